@@ -1,0 +1,30 @@
+#pragma once
+
+#include <array>
+#include <cstdint>
+
+namespace mirevo {
+
+/// The run's uniform random stream: three linear congruential generators with a shuffle table of 97 entries. The same
+/// seed gives the same stream on every machine.
+class UniformGenerator final {
+ public:
+  /// The stream of a run: the sign of the seed does not matter.
+  explicit UniformGenerator(std::int32_t seed);
+
+  /// The next deviate in [0, 1).
+  double next();
+
+  /// The generator proper: a negative `idum`, or the first call, re-initialises it, after which `idum` is 1.
+  double uniformDeviate(std::int32_t& idum);
+
+ private:
+  std::int32_t seedVariable_;
+  bool initialised_ = false;
+  std::int32_t ix1_ = 0;
+  std::int32_t ix2_ = 0;
+  std::int32_t ix3_ = 0;
+  std::array<double, 97> table_{};
+};
+
+}  // namespace mirevo

@@ -1,0 +1,34 @@
+#pragma once
+
+#include <exception>
+#include <string>
+#include <string_view>
+
+namespace mirevo {
+
+/// An unrecoverable condition. `what()` is the fixed message text that goes to the log; `detail()` holds further lines
+/// (location, what was found, what to do), without a trailing newline, empty when there is nothing to add.
+class FatalError final : public std::exception {
+ public:
+  explicit FatalError(std::string message, std::string detail = {});
+
+  const char* what() const noexcept override { return message_.c_str(); }
+  const std::string& message() const noexcept { return message_; }
+  const std::string& detail() const noexcept { return detail_; }
+
+ private:
+  std::string message_;
+  std::string detail_;
+};
+
+/// Thrown where a cancelled run stops; caught only by the run driver.
+class RunCancelled final : public std::exception {
+ public:
+  const char* what() const noexcept override { return "Simulation cancelled"; }
+};
+
+/// Aborts the run: throws FatalError, which the run driver turns into the fixed order of the end (log, model
+/// processes, MPI, progress report, exit code 1). `detail` is written to the log as further lines below the message.
+[[noreturn]] void fatalError(std::string_view message, std::string_view detail = {});
+
+}  // namespace mirevo

@@ -1,0 +1,86 @@
+#include "common/files.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstring>
+
+namespace mirevo {
+namespace {
+
+/// Closes a descriptor at the end of its scope, keeping errno.
+class Descriptor final {
+ public:
+  explicit Descriptor(int fd) : fd_(fd) {}
+  ~Descriptor() {
+    const int saved = errno;
+    if (fd_ >= 0) ::close(fd_);
+    errno = saved;
+  }
+  Descriptor(const Descriptor&) = delete;
+  Descriptor& operator=(const Descriptor&) = delete;
+  int get() const { return fd_; }
+
+ private:
+  int fd_;
+};
+
+bool writeAll(int fd, std::string_view content) {
+  while (!content.empty()) {
+    const ssize_t written = ::write(fd, content.data(), content.size());
+    if (written < 0) {
+      if (errno == EINTR) continue;
+      return false;
+    }
+    content.remove_prefix(static_cast<std::size_t>(written));
+  }
+  return true;
+}
+
+}  // namespace
+
+std::optional<std::string> readTextFile(const std::string& path, std::string& reason) {
+  const Descriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC));
+  struct stat status {};
+  if (file.get() < 0 || ::fstat(file.get(), &status) != 0) {
+    reason = std::strerror(errno);
+    return std::nullopt;
+  }
+  if (S_ISDIR(status.st_mode)) {
+    reason = std::strerror(EISDIR);
+    return std::nullopt;
+  }
+  std::string content;
+  content.resize(static_cast<std::size_t>(status.st_size));
+  std::size_t size = 0;
+  while (true) {
+    if (size == content.size()) content.resize(content.size() + 65536);
+    const ssize_t got = ::read(file.get(), content.data() + size, content.size() - size);
+    if (got < 0) {
+      if (errno == EINTR) continue;
+      reason = std::strerror(errno);
+      return std::nullopt;
+    }
+    if (got == 0) break;
+    size += static_cast<std::size_t>(got);
+  }
+  content.resize(size);
+  return content;
+}
+
+bool writeByUnlinkAndCreate(const std::string& path, std::string_view content, unsigned mode, std::string& reason) {
+  if (::unlink(path.c_str()) != 0 && errno != ENOENT) {
+    reason = std::strerror(errno);
+    return false;
+  }
+  const Descriptor file(::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, mode & 07777));
+  if (file.get() < 0 || ::fchmod(file.get(), mode & 07777) != 0 || !writeAll(file.get(), content)) {
+    reason = std::strerror(errno);
+    return false;
+  }
+  return true;
+}
+
+}  // namespace mirevo

@@ -1,0 +1,18 @@
+#pragma once
+
+#include <optional>
+#include <string>
+#include <string_view>
+
+namespace mirevo {
+
+/// The whole content of a file, or nothing with the system's reason in `reason` ("No such file or directory").
+/// A folder is refused like a file that cannot be read.
+std::optional<std::string> readTextFile(const std::string& path, std::string& reason);
+
+/// Text files that are written often and whole: removes `path` and creates it anew with `mode` and `content`. On ext4
+/// creating a file is an order of magnitude cheaper than truncating an existing one. False, with the system's reason,
+/// when that fails.
+bool writeByUnlinkAndCreate(const std::string& path, std::string_view content, unsigned mode, std::string& reason);
+
+}  // namespace mirevo

@@ -1,0 +1,141 @@
+#include "common/text.h"
+
+#include <fmt/format.h>
+
+#include <algorithm>
+#include <charconv>
+#include <cmath>
+#include <numeric>
+
+namespace mirevo {
+namespace {
+
+constexpr std::string_view kBlank = " \t\r\n";
+
+char lowerAscii(char c) { return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c; }
+
+/// Levenshtein distance, case ignored.
+std::size_t editDistance(std::string_view a, std::string_view b) {
+  std::vector<std::size_t> row(b.size() + 1);
+  std::iota(row.begin(), row.end(), std::size_t{0});
+  for (std::size_t i = 1; i <= a.size(); ++i) {
+    std::size_t diagonal = row[0];
+    row[0] = i;
+    for (std::size_t j = 1; j <= b.size(); ++j) {
+      const std::size_t substitution = diagonal + (lowerAscii(a[i - 1]) == lowerAscii(b[j - 1]) ? 0 : 1);
+      diagonal = row[j];
+      row[j] = std::min({row[j] + 1, row[j - 1] + 1, substitution});
+    }
+  }
+  return row[b.size()];
+}
+
+}  // namespace
+
+std::string_view trimTrailing(std::string_view text) {
+  const auto last = text.find_last_not_of(" \t\r");
+  return last == std::string_view::npos ? std::string_view{} : text.substr(0, last + 1);
+}
+
+std::string_view trim(std::string_view text) {
+  const auto first = text.find_first_not_of(kBlank);
+  if (first == std::string_view::npos) return {};
+  return text.substr(first, text.find_last_not_of(kBlank) - first + 1);
+}
+
+std::string toLowerAscii(std::string_view text) {
+  std::string lower(text);
+  std::transform(lower.begin(), lower.end(), lower.begin(), lowerAscii);
+  return lower;
+}
+
+bool equalIgnoringCase(std::string_view a, std::string_view b) {
+  return std::equal(a.begin(), a.end(), b.begin(), b.end(),
+                    [](char x, char y) { return lowerAscii(x) == lowerAscii(y); });
+}
+
+std::optional<double> parseReal(std::string_view text) {
+  text = trim(text);
+  if (!text.empty() && text.front() == '+') {
+    text.remove_prefix(1);
+    if (!text.empty() && text.front() == '-') return std::nullopt;
+  }
+  // from_chars would take "inf" and "nan", which are no values a user means.
+  for (const char c : text) {
+    const char lower = lowerAscii(c);
+    if (!(c >= '0' && c <= '9') && c != '.' && c != '+' && c != '-' && lower != 'e' && lower != 'd') {
+      return std::nullopt;
+    }
+  }
+  std::string exponentForm;
+  if (const auto d = text.find_first_of("dD"); d != std::string_view::npos) {
+    exponentForm = text;
+    exponentForm[d] = 'e';
+    text = exponentForm;
+  }
+  double value = 0.0;
+  const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
+  if (end != text.data() + text.size() || text.empty()) return std::nullopt;
+  if (error == std::errc::result_out_of_range) {
+    // Too small for a double is a zero, too large is no number.
+    return std::abs(value) < 1.0 ? std::optional<double>(0.0) : std::nullopt;
+  }
+  if (error != std::errc{}) return std::nullopt;
+  return value;
+}
+
+std::optional<std::int32_t> parseInteger(std::string_view text) {
+  text = trim(text);
+  if (!text.empty() && text.front() == '+') {
+    text.remove_prefix(1);
+    if (!text.empty() && text.front() == '-') return std::nullopt;
+  }
+  std::int32_t value = 0;
+  const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
+  if (error != std::errc{} || end != text.data() + text.size()) return std::nullopt;
+  return value;
+}
+
+std::string formatReal(double value) {
+  if (std::isnan(value)) return "NaN";
+  if (std::isinf(value)) return value > 0 ? "Inf" : "-Inf";
+  return fmt::format("{}", value);
+}
+
+std::string withNumber(std::string_view text, std::int64_t number) {
+  std::string result(text);
+  if (const auto position = result.find('%'); position != std::string::npos) {
+    result.replace(position, 1, std::to_string(number));
+  }
+  return result;
+}
+
+std::optional<std::string> nearestName(std::string_view name, std::span<const std::string> candidates) {
+  const std::size_t limit = std::max<std::size_t>(1, name.size() / 3);
+  std::optional<std::string> nearest;
+  std::size_t nearestDistance = limit + 1;
+  for (const std::string& candidate : candidates) {
+    const std::size_t lengthGap =
+        candidate.size() > name.size() ? candidate.size() - name.size() : name.size() - candidate.size();
+    if (lengthGap >= nearestDistance) continue;
+    if (const std::size_t distance = editDistance(name, candidate); distance < nearestDistance) {
+      nearest = candidate;
+      nearestDistance = distance;
+    }
+  }
+  return nearest;
+}
+
+std::vector<std::string_view> splitLines(std::string_view text) {
+  std::vector<std::string_view> lines;
+  while (!text.empty()) {
+    const auto end = text.find('\n');
+    std::string_view line = text.substr(0, end);
+    text.remove_prefix(end == std::string_view::npos ? text.size() : end + 1);
+    if (!line.empty() && line.back() == '\r') line.remove_suffix(1);
+    lines.push_back(line);
+  }
+  return lines;
+}
+
+}  // namespace mirevo

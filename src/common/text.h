@@ -1,0 +1,44 @@
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <span>
+#include <string>
+#include <string_view>
+#include <vector>
+
+namespace mirevo {
+
+/// `text` without trailing blanks, tabs and carriage returns: the meaning of a blank-padded field.
+std::string_view trimTrailing(std::string_view text);
+
+/// `text` without blanks, tabs and line ends on either side.
+std::string_view trim(std::string_view text);
+
+/// ASCII lower case, independent of the locale.
+std::string toLowerAscii(std::string_view text);
+
+/// Whether the two are equal when ASCII letters are compared without case.
+bool equalIgnoringCase(std::string_view a, std::string_view b);
+
+/// The whole of `text` (blanks around it allowed) as a real number in any decimal or exponent form, `D` exponents and a
+/// leading `+` included; nothing when any of it is no number. "nan" and "inf" in any form are no numbers here.
+std::optional<double> parseReal(std::string_view text);
+
+/// The whole of `text` (blanks around it allowed) as a decimal integer within 32 bits.
+std::optional<std::int32_t> parseInteger(std::string_view text);
+
+/// The shortest decimal text that reads back as the same 64 bits ("NaN", "Inf", "-Inf" for the others).
+std::string formatReal(double value);
+
+/// The fixed texts with a number in them: `text` with its first "%" replaced by `number`.
+std::string withNumber(std::string_view text, std::int64_t number);
+
+/// The candidate nearest to `name` (Levenshtein distance, case ignored), for "did you mean"; nothing when none is
+/// closer than a third of the name's length, at least one edit.
+std::optional<std::string> nearestName(std::string_view name, std::span<const std::string> candidates);
+
+/// The lines of `text`, without their line ends (LF or CRLF); a last line without an end counts.
+std::vector<std::string_view> splitLines(std::string_view text);
+
+}  // namespace mirevo

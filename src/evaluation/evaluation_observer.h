@@ -1,0 +1,29 @@
+#pragma once
+
+#include <span>
+#include <string_view>
+
+#include "common/parameter_set.h"
+#include "evaluation/evaluation_result.h"
+
+namespace mirevo {
+
+/// Learns what the evaluation loops do; reports it, records it, and knows whether the run was cancelled.
+class EvaluationObserver {
+ public:
+  EvaluationObserver() = default;
+  EvaluationObserver(const EvaluationObserver&) = delete;
+  EvaluationObserver& operator=(const EvaluationObserver&) = delete;
+  virtual ~EvaluationObserver() = default;
+
+  /// A message of the run, for the log and the progress viewer.
+  virtual void message(std::string_view text) = 0;
+  /// A warning for the log alone.
+  virtual void warning(std::string_view text) = 0;
+  /// An evaluation has finished, in order of arrival; `set` is on the search scale. Called before its result is used.
+  virtual void evaluationFinished(std::span<const double> set, const EvaluationResult& result) = 0;
+  /// Whether an outside party wants the run to stop. Once true it stays true.
+  virtual bool isCancelled() = 0;
+};
+
+}  // namespace mirevo

@@ -1,0 +1,42 @@
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <vector>
+
+namespace mirevo {
+
+/// Every measure, objective function and aggregate of a failed evaluation: worse than any real result.
+inline constexpr double kFailedRunValue = 1.0e30;
+
+/// Why an evaluation failed, and what its batch said last.
+struct EvaluationFailure {
+  enum class Kind {
+    constraintsViolated,
+    equationNotFinite,
+    couldNotStart,
+    exitCode,
+    signal,
+    timedOut,
+    resultsNotWritten,
+    resultsNotReadable,
+    resultNotFinite,
+  };
+  Kind kind = Kind::exitCode;
+  std::string reason;                   ///< one line for a person
+  std::vector<std::string> lastOutput;  ///< the last lines that the batch printed
+};
+
+/// What one parameter set yielded.
+struct EvaluationResult {
+  int number = 0;                       ///< the set's number in the run, from 1
+  std::vector<double> measureValues;    ///< one an output measure
+  std::vector<double> objectiveValues;  ///< one an objective function
+  double aggregate = kFailedRunValue;   ///< what the searches minimise
+  std::optional<EvaluationFailure> failure;
+
+  bool ok() const { return !failure.has_value(); }
+};
+
+}  // namespace mirevo

@@ -1,0 +1,60 @@
+#pragma once
+
+#include <optional>
+#include <span>
+#include <string>
+#include <vector>
+
+#include "evaluation/evaluation_result.h"
+#include "measures/objective_functions.h"
+#include "measures/output_measure.h"
+#include "measures/series_tables.h"
+#include "parameters/parameter_model.h"
+#include "parameters/template_file.h"
+#include "platform/process_launcher.h"
+
+namespace mirevo {
+
+/// Everything that turns a parameter set into a result, apart from the parameters themselves. File names are absolute.
+struct ModelDescription {
+  std::string baseFolder;
+  std::string fileTag;  ///< marks the files that a run makes, so that runs do not meet
+  std::vector<ParameterFileItem> parameterFiles;
+  std::vector<OutputMeasure> measures;
+  std::string measureFile;  ///< output-measure file; empty when no measure is of interface type 1
+  EvaluationPeriod period;
+  std::vector<ObjectiveFunction> objectives;
+};
+
+/// Model runs in slots: writes the input, starts the batch, and turns what it wrote into a result. Used by the local loop
+/// and by an MPI worker (which has slot 1 alone).
+class ModelRunner final {
+ public:
+  /// Reads and checks the templates and opens the observed series (all before any folder is made), then has the launcher
+  /// make the slots' folders. Throws FatalError.
+  ModelRunner(ModelDescription description, ParameterModel& parameters, ObjectiveAggregator& aggregator,
+              ProcessLauncher& launcher, const LauncherSettings& launcherSettings);
+
+  /// Builds the full parameter vector, removes the results of the slot's last run, writes the parameter files and starts
+  /// the batch; or says why the set is not run.
+  std::optional<EvaluationFailure> prepareModelRun(std::span<const double> set, int slot);
+
+  /// After the slot's batch has ended: its result, with number 0.
+  EvaluationResult collect(int slot);
+
+  /// A result with the failed-run value in every field.
+  EvaluationResult failedResult(EvaluationFailure failure) const;
+
+  ObjectiveAggregator& aggregator() { return aggregator_; }
+  ProcessLauncher& launcher() { return launcher_; }
+
+ private:
+  ModelDescription description_;
+  ParameterModel& parameters_;
+  ObjectiveAggregator& aggregator_;
+  ProcessLauncher& launcher_;
+  SeriesTables series_;
+  std::vector<ParameterTemplate> templates_;
+};
+
+}  // namespace mirevo

@@ -1,0 +1,61 @@
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <span>
+#include <string>
+#include <vector>
+
+namespace mirevo {
+
+enum class FunctionType : std::int32_t { sum = 0, sumOfAbsolutes = 1, sumOfSquares = 2 };
+enum class AggregationMethod : std::int32_t { none = 0, commonDistance = 1, commonProbability = 2, zero = 3 };
+
+/// Combines output measures into one value and weighs it in the aggregate.
+struct ObjectiveFunction {
+  std::string name;
+  FunctionType functionType = FunctionType::sum;
+  double weight = 1.0;
+  std::vector<std::size_t> measures;        ///< 0-based indices into the run's output measures
+  std::optional<double> standardDeviation;  ///< σ of the transformation, where the setup gives it
+  std::optional<double> location;           ///< μ, likewise
+};
+
+/// The name of an aggregation method in the run log; empty for method 3.
+std::string aggregationMethodName(AggregationMethod method);
+
+/// The objective functions' values of one evaluation, in setup order.
+std::vector<double> objectiveFunctionValues(std::span<const ObjectiveFunction> functions,
+                                            std::span<const double> measureValues);
+
+/// The aggregate over the objective functions: n values, weights, σ and μ each. n < 1 yields 0. Method 1 divides by σ
+/// and then adds μ, method 2 subtracts μ first: deliberate.
+double aggregateObjective(std::span<const double> values, std::span<const double> weights,
+                          std::span<const double> sigma, std::span<const double> mu, AggregationMethod method);
+
+/// The second stage with its transformation parameters, some of which are known only after the initial sample.
+class ObjectiveAggregator final {
+ public:
+  ObjectiveAggregator(std::span<const ObjectiveFunction> functions, AggregationMethod method);
+
+  /// Whether every σ and μ that the method needs is known.
+  bool isSettled() const;
+  /// The aggregate, NaN while it is not settled.
+  double aggregate(std::span<const double> objectiveValues) const;
+  /// Takes the missing σ and μ from the initial sample: one row of objective values an evaluation that succeeded.
+  /// Throws FatalError naming an objective function that is constant over the sample.
+  void fit(std::span<const std::vector<double>> sample);
+
+  AggregationMethod method() const { return method_; }
+  const std::vector<double>& sigma() const { return sigma_; }
+  const std::vector<double>& mu() const { return mu_; }
+
+ private:
+  AggregationMethod method_;
+  std::vector<std::string> names_;
+  std::vector<double> weights_;
+  std::vector<double> sigma_;  ///< NaN while unknown
+  std::vector<double> mu_;     ///< NaN while unknown
+};
+
+}  // namespace mirevo

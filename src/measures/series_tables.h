@@ -1,0 +1,46 @@
+#pragma once
+
+#include <memory>
+#include <span>
+#include <string>
+#include <vector>
+
+#include "measures/output_measure.h"
+#include "platform/time_series_object.h"
+
+namespace mirevo {
+
+/// The opened time-series files of the run: every distinct observation file, open for the whole run, and every distinct
+/// simulation file, open only while the measures of one evaluation are computed.
+class SeriesTables final {
+ public:
+  /// Opens every observation file and, once as a check, every simulation file, and releases those again. Measures of
+  /// interface type 1 name no series. Throws FatalError with the fixed texts.
+  static SeriesTables MirevoTSobjectInit(std::span<const OutputMeasure> measures);
+
+  /// Opens the simulation files of one evaluation, in table order. `locate` turns a simulation file name of the setup
+  /// into the path in the slot's folder.
+  void openSimulationFiles(std::span<const std::string> paths);
+  void releaseSimulationFiles();
+
+  const std::vector<std::string>& observationFileNames() const { return observationNames_; }
+  const std::vector<std::string>& simulationFileNames() const { return simulationNames_; }
+
+  /// The file of the measure with that 0-based index; the simulation one only between open and release.
+  TimeSeriesObject& observation(std::size_t measure);
+  TimeSeriesObject& simulation(std::size_t measure);
+
+ private:
+  std::vector<std::string> observationNames_;
+  std::vector<std::string> simulationNames_;
+  std::vector<std::size_t> observationIndex_;  ///< one a measure, 0-based
+  std::vector<std::size_t> simulationIndex_;
+  std::vector<std::unique_ptr<TimeSeriesObject>> observations_;
+  std::vector<std::unique_ptr<TimeSeriesObject>> simulations_;
+};
+
+/// Creates and opens one file. Throws FatalError with "Error creating TS object for file: " or
+/// "Error opening TS object for file: " and the name; the detail holds the location.
+std::unique_ptr<TimeSeriesObject> openTimeSeries(const std::string& fileName);
+
+}  // namespace mirevo

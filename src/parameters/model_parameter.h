@@ -1,0 +1,33 @@
+#pragma once
+
+#include <cstdint>
+#include <string>
+#include <vector>
+
+namespace mirevo {
+
+enum class TransformationType : std::int32_t { none = 0, logarithmic = 1, integer = 2 };
+enum class ParameterType : std::int32_t { variable = 0, fixed = 1, dependent = 2 };
+
+/// One parameter of the model as the setup describes it; values and bounds are on the model scale.
+struct ModelParameter {
+  double initialValue = 0.0;
+  double lowerBound = 0.0;
+  double upperBound = 0.0;
+  TransformationType transformationType = TransformationType::none;
+  ParameterType parameterType = ParameterType::variable;
+  double idValue = 0.0;  ///< stands for the parameter in numeric-ID templates, such as 1.5E-035
+  std::string name;      ///< unique, at most 255 bytes, trailing blanks trimmed
+  std::string equation;  ///< of a dependent parameter
+  std::string comment;
+  std::vector<std::string> keyLines;  ///< kept with the parameter, not interpreted
+};
+
+/// Compares two equations over the model parameters; a set that violates it is not run.
+struct InternalConstraint {
+  std::string leftEquation;
+  std::string rightEquation;
+  std::int32_t logicalOperator = 0;  ///< 0 <, 1 <=, 2 >, 3 >=
+};
+
+}  // namespace mirevo

@@ -1,0 +1,46 @@
+#pragma once
+
+#include <memory>
+#include <optional>
+#include <span>
+#include <string>
+#include <variant>
+#include <vector>
+
+#include "parameters/search_space.h"
+
+namespace mirevo {
+
+/// Why a parameter set cannot be run.
+struct ParameterFailure {
+  enum class Kind { constraintViolated, equationNotFinite };
+  Kind kind = Kind::constraintViolated;
+  std::string detail;  ///< one line: which constraint or equation, with the values of its sides
+};
+
+/// All parameters of the model: the search space, the order of evaluation, the compiled equations and constraints.
+class ParameterModel final {
+ public:
+  /// Builds the search space, refuses illegal relationships, orders the dependent parameters and compiles every
+  /// equation once. Throws FatalError with the fixed texts.
+  ParameterModel(std::vector<ModelParameter> parameters, std::vector<InternalConstraint> constraints);
+  ~ParameterModel();
+  ParameterModel(const ParameterModel&) = delete;
+  ParameterModel& operator=(const ParameterModel&) = delete;
+
+  const std::vector<ModelParameter>& parameters() const;
+  const SearchSpace& searchSpace() const;
+  /// A permutation of 1..N: every dependent parameter stands after those that its equation names.
+  const std::vector<int>& evaluationOrder() const;
+
+  /// The full parameter vector of a model run (model scale, one value per parameter in setup order), or why the set
+  /// cannot be run: an equation without a finite value, or a violated constraint. The vector stays valid until the next
+  /// call.
+  std::variant<std::span<const double>, ParameterFailure> MapToModelValues(std::span<const double> set);
+
+ private:
+  class Implementation;
+  std::unique_ptr<Implementation> implementation_;
+};
+
+}  // namespace mirevo

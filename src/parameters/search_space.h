@@ -1,0 +1,39 @@
+#pragma once
+
+#include <span>
+#include <string>
+#include <vector>
+
+#include "common/parameter_set.h"
+#include "parameters/model_parameter.h"
+
+namespace mirevo {
+
+enum class TransformDirection : std::int32_t { forward = 0, backward = 1 };
+
+/// Transforms one value between the model scale and the search scale. `lowerBound` anchors the grid of an integer
+/// parameter. `failed` becomes true, and the result 0, only for the forward logarithm of a value not greater than 0.
+double TransformParameterValue(double value, double lowerBound, TransformationType type, TransformDirection direction,
+                               bool& failed);
+
+/// The variable parameters on the search scale, in setup order; every vector has one entry a variable parameter.
+struct SearchSpace {
+  std::vector<std::string> names;
+  std::vector<double> initial;
+  std::vector<double> lower;
+  /// For an integer parameter one more than the transformed bound, on purpose: the searches draw continuous values in
+  /// [lower, upper + 1) and truncation then reaches every integer with equal width.
+  std::vector<double> upper;
+  std::vector<TransformationType> transformation;
+
+  std::size_t size() const { return names.size(); }
+};
+
+/// Derives the search space from all parameters. Throws FatalError for an initial value outside its bounds, a
+/// transformation that fails, or no variable parameter at all.
+SearchSpace BuildSearchSpace(std::span<const ModelParameter> parameters);
+
+/// The values of a set on the model scale: shape and order of the set.
+std::vector<double> ToModelScale(const SearchSpace& space, std::span<const double> set);
+
+}  // namespace mirevo

@@ -1,0 +1,59 @@
+#pragma once
+
+#include <cstdint>
+#include <span>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "parameters/model_parameter.h"
+
+namespace mirevo {
+
+inline constexpr std::int32_t kNumericIdTemplate = 1;  ///< `FileType`; any other value is a delimiter template
+
+/// One model parameter file of the setup. File names are absolute, in or below the base folder.
+struct ParameterFileItem {
+  std::int32_t fileType = 0;
+  std::string paramFileName;
+  std::string templateFileName;
+};
+
+/// The delimiter template that a numeric-ID template stands for, as text with its delimiter line. `templateName` is
+/// used in messages. Throws FatalError for an ID value that no parameter has.
+std::string ConvertIdTemplate(std::string_view templateName, std::string_view text,
+                              std::span<const ModelParameter> parameters);
+
+/// A delimiter template taken apart once, so that writing a parameter file costs one pass over its pieces.
+class ParameterTemplate final {
+ public:
+  /// Throws FatalError for a text without a delimiter in its first line and for a placeholder that names no parameter.
+  ParameterTemplate(std::string_view templateName, std::string_view text, std::span<const ModelParameter> parameters);
+
+  /// The parameter file's content for a full parameter vector.
+  std::string fill(std::span<const double> modelValues) const;
+
+  /// 0-based indices of the parameters that the template names, ascending, each once.
+  std::vector<std::size_t> parametersNamed() const;
+
+  /// One warning a placeholder in which values between the parameter's bounds keep fewer than four significant digits,
+  /// with the width to use.
+  std::vector<std::string> narrowPlaceholderWarnings(std::span<const ModelParameter> parameters) const;
+
+ private:
+  struct Placeholder {
+    std::size_t parameter = 0;  ///< 0-based
+    int width = 0;              ///< delimiters included
+    int line = 0;               ///< in the template, from 1
+  };
+  std::string templateName_;
+  std::vector<std::string> pieces_;  ///< text before, between and after the placeholders
+  std::vector<Placeholder> placeholders_;
+};
+
+/// Writes a parameter file anew, keeping its mode; it must exist already. Throws FatalError with
+/// "Error: Unable to open " and the path, and the system's reason below.
+void WriteParameterFile(const std::string& path, const ParameterTemplate& parameterTemplate,
+                        std::span<const double> modelValues);
+
+}  // namespace mirevo

@@ -1,0 +1,14 @@
+#pragma once
+
+#include <string>
+
+namespace mirevo {
+
+/// Widest field that a value is written into; wider placeholders keep blanks behind it.
+inline constexpr int kMaximumValueWidth = 20;
+
+/// The text of a value for a placeholder of `width` characters (delimiters included): right-aligned in its first
+/// min(width, 20) characters. Returns exactly `width` characters.
+std::string FormatValueForPlaceholder(double value, int width);
+
+}  // namespace mirevo

@@ -1,0 +1,79 @@
+#pragma once
+
+#include <cstdint>
+#include <memory>
+#include <string>
+#include <string_view>
+#include <unordered_map>
+#include <variant>
+#include <vector>
+
+#include "common/date_record.h"
+
+namespace mirevo {
+
+/// Where something stands in a KDX text; both count from 1, columns in bytes.
+struct KdxPosition {
+  int line = 0;
+  int column = 0;
+};
+
+/// One typed value of a keyword, with the place it was read from.
+struct KdxValue {
+  std::variant<std::int32_t, double, std::string, DateRecord> value;
+  KdxPosition position;
+};
+
+/// A keyword line: `Name = value {, value}`.
+struct KdxKeyword {
+  std::string name;
+  std::vector<KdxValue> values;
+  KdxPosition position;
+};
+
+/// A section with its keywords and nested sections, in file order. Look-ups by name are by hash, so that a setup of
+/// tens of thousands of sections is read in linear time.
+class KdxSection final {
+ public:
+  KdxSection(std::string name, KdxPosition position);
+
+  const std::string& name() const { return name_; }
+  KdxPosition position() const { return position_; }
+  const std::vector<KdxKeyword>& keywords() const { return keywords_; }
+  const std::vector<std::unique_ptr<KdxSection>>& sections() const { return sections_; }
+
+  /// The `instance`-th (from 1) nested section of that name; nullptr when there is none.
+  const KdxSection* section(std::string_view name, int instance = 1) const;
+  /// The `instance`-th keyword of that name; nullptr when there is none.
+  const KdxKeyword* keyword(std::string_view name, int instance = 1) const;
+  /// How often a keyword of that name stands here.
+  int keywordCount(std::string_view name) const;
+
+  KdxKeyword& addKeyword(KdxKeyword keyword);
+  KdxSection& addSection(std::string name, KdxPosition position);
+
+ private:
+  std::string name_;
+  KdxPosition position_;
+  std::vector<KdxKeyword> keywords_;
+  std::vector<std::unique_ptr<KdxSection>> sections_;
+  std::unordered_map<std::string, std::vector<std::size_t>> keywordIndex_;
+  std::unordered_map<std::string, std::vector<std::size_t>> sectionIndex_;
+};
+
+/// Why a KDX text cannot be read: the first place where it breaks, and what was expected there.
+struct KdxSyntaxError {
+  KdxPosition position;
+  std::string message;
+};
+
+/// A parsed KDX text: its targets are the sections of `root`.
+struct KdxDocument {
+  std::string sourceName;
+  KdxSection root{"", {}};
+};
+
+/// Parses a KDX text. `sourceName` is kept for messages only.
+std::variant<KdxDocument, KdxSyntaxError> parseKdx(std::string sourceName, std::string_view text);
+
+}  // namespace mirevo

@@ -1,0 +1,86 @@
+#pragma once
+
+#include <cstdint>
+#include <string>
+#include <vector>
+
+namespace mirevo {
+
+/// One item of the simulation batch; the items of a batch run one after another.
+struct BatchItem {
+  std::string batchFileName;  ///< absolute path in the base folder
+  std::string arguments;      ///< as the setup has them; split as a shell splits words
+};
+
+struct LauncherSettings {
+  std::string baseFolder;             ///< absolute; holds the first batch file, is copied and never written
+  std::string processFolderPrefix;    ///< absolute; slot n runs in this text followed by n
+  std::vector<BatchItem> batchItems;  ///< at least one
+  int slotCount = 1;
+  bool useSingleThread = false;  ///< set the usual thread-count variables to 1 for the model
+  double graceSeconds = 2.0;     ///< between SIGTERM and SIGKILL when processes are halted
+};
+
+/// How a slot's batch ended, or that it has not yet.
+enum class BatchStatus : std::int32_t { succeeded = 0, failed = 1 };
+
+/// Why a batch failed.
+struct BatchFailure {
+  enum class Kind { none, exitCode, signal, couldNotStart };
+  Kind kind = Kind::none;
+  int code = 0;        ///< exit code or signal number
+  std::string detail;  ///< one line for a person, naming the batch file: "run.sh exited with code 3"
+};
+
+/// Outcome of the update of a river model's resistance numbers.
+enum class ResistanceUpdate {
+  updated,
+  functionNotFound,
+  libraryNotFound,
+  writeError,
+  readError,
+  documentCreationFailed,
+  noReadAccess,
+  wrongExtension,
+};
+
+/// Starts and watches the model's processes, one batch a slot, each slot in a folder of its own. Slots count from 1.
+class ProcessLauncher {
+ public:
+  ProcessLauncher() = default;
+  ProcessLauncher(const ProcessLauncher&) = delete;
+  ProcessLauncher& operator=(const ProcessLauncher&) = delete;
+  virtual ~ProcessLauncher() = default;
+
+  /// Makes every slot's process folder anew as a copy of the base folder. False when that fails; lastError() says why.
+  virtual bool initialise(const LauncherSettings& settings) = 0;
+  virtual const std::string& lastError() const = 0;
+
+  /// Absolute path of the slot's folder, without a trailing separator.
+  virtual std::string getProcessFolder(int slot) const = 0;
+
+  /// Starts the slot's batch. A batch that cannot be started is reported by isExecuting() as failed.
+  virtual void createProcesses(int slot) = 0;
+
+  /// `executing` becomes 1 while the slot's batch runs, else 0; `status` is then a BatchStatus.
+  virtual void isExecuting(int slot, std::int32_t& executing, std::int32_t& status) = 0;
+
+  /// Why the slot's last batch failed.
+  virtual BatchFailure failure(int slot) const = 0;
+
+  /// One line when the slot's last batch left processes behind that had to be ended, else empty.
+  virtual std::string leftBehind(int slot) const = 0;
+
+  /// The last lines that the slot's last batch printed, at most `lineCount`.
+  virtual std::vector<std::string> lastOutput(int slot, int lineCount) const = 0;
+
+  /// Waits until a running batch has changed its state, a signal arrives, or `seconds` have passed.
+  virtual void waitForChange(double seconds) = 0;
+
+  /// Ends every process that was started and still runs, and does not return before they are gone.
+  virtual void haltProcesses() = 0;
+
+  virtual ResistanceUpdate r35UpdateResistanceNumbers(const std::string& fileName) = 0;
+};
+
+}  // namespace mirevo

@@ -1,0 +1,6 @@
+#include <cstdio>
+
+int main() {
+  std::fputs("Usage: Mirevo kdx-file\n", stderr);
+  return 1;
+}

@@ -1,0 +1,95 @@
+#pragma once
+
+#include <cstdint>
+#include <string>
+#include <vector>
+
+#include "algorithms/search_settings.h"
+#include "measures/objective_functions.h"
+#include "measures/output_measure.h"
+#include "parameters/model_parameter.h"
+#include "parameters/template_file.h"
+#include "platform/process_launcher.h"
+
+namespace mirevo {
+
+enum class SimulationOption : std::int32_t {
+  scenarioRuns = 0,
+  sensitivityAnalysis = 1,
+  parameterOptimisation = 2,
+  uncertaintyAnalysis = 3
+};
+enum class AlgorithmType : std::int32_t { sce = 0, pse = 1, dds = 2 };
+
+struct ScenarioConfig {
+  std::int32_t scenarioType = 0;  ///< 0 single run with the initial set, 1 multiple runs
+  std::int32_t runCount = 0;
+  std::vector<std::vector<double>> runs;  ///< one value a model parameter, model scale
+};
+
+struct SensitivityConfig {
+  std::int32_t sensitivityType = 0;
+  std::int32_t differencing = 0;        ///< 0 forward, 1 central
+  std::int32_t perturbationOption = 0;  ///< fraction of 0 the parameter's range, 1 its value
+  double perturbationFraction = 0.01;
+  bool calculateCovarianceMatrix = false;
+};
+
+struct OptimisationConfig {
+  AlgorithmType algorithmType = AlgorithmType::dds;
+  std::int32_t useSurrogateModel = 0;
+  SceSettings sce;
+  PseSettings pse;
+  DdsSettings dds;
+  SimplexSettings simplex;  ///< shared by SCE and PSE
+  SurrogateSettings surrogate;
+  StoppingCriteria stopping;
+  InitialSampleSettings initialSample;
+};
+
+struct UncertaintyParameter {
+  double mean = 0.0;               ///< search scale
+  double standardDeviation = 0.0;  ///< search scale
+};
+
+struct UncertaintyConfig {
+  std::int32_t uncertaintyType = 0;  ///< 0 simple random, 1 Latin hypercube sampling
+  std::int32_t sampleSize = 0;
+  std::vector<UncertaintyParameter> parameters;  ///< one a variable parameter
+};
+
+/// All settings of a run. File names are absolute. Composed of the settings that each part defines for itself; no part
+/// below the run driver sees the whole.
+struct RunConfig {
+  std::string setupFile;    ///< absolute path
+  std::string setupFolder;  ///< absolute, without a trailing separator
+  std::string setupName;    ///< file name without the ending ".kdx"
+
+  SimulationOption simulationOption = SimulationOption::scenarioRuns;
+  std::string title;
+  std::vector<BatchItem> batchItems;
+  std::string baseFolder;  ///< the folder of the first batch file
+  std::vector<ParameterFileItem> parameterFiles;
+  std::vector<ModelParameter> parameters;
+  std::vector<InternalConstraint> constraints;
+  EvaluationPeriod period;
+  AggregationMethod aggregationMethod = AggregationMethod::none;
+  std::vector<OutputMeasure> measures;
+  std::string measureFile;
+  std::vector<ObjectiveFunction> objectives;
+  std::vector<std::string> savedOutputFiles;
+
+  ScenarioConfig scenario;
+  SensitivityConfig sensitivity;
+  OptimisationConfig optimisation;
+  UncertaintyConfig uncertainty;
+  std::int32_t randomSeed = 1;  ///< of the initial sample and of the uncertainty analysis: one setting
+
+  std::int32_t simultaneousSimulations = 1;
+  bool useSingleThread = false;
+
+  /// Model evaluations that the task plans; sizes the failed-run limit and the progress report.
+  int plannedEvaluations() const;
+};
+
+}  // namespace mirevo

@@ -1,0 +1,2 @@
+// The small model that process and integration tests run.
+int main() { return 0; }
