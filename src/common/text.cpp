@@ -1,18 +1,28 @@
 #include "common/text.h"
 
-#include <fmt/format.h>
-
 #include <algorithm>
 #include <charconv>
 #include <cmath>
 #include <numeric>
+
+#include <fmt/format.h>
 
 namespace mirevo {
 namespace {
 
 constexpr std::string_view kBlank = " \t\r\n";
 
-char lowerAscii(char c) { return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c; }
+char lowerAscii(char c) {
+  return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c;
+}
+
+/// Whether a number outside the range of a double is too small for it (and so a zero) and not too large (and so none).
+bool isTooSmall(std::string_view number) {
+  if (const auto e = number.find_first_of("eE"); e != std::string_view::npos) {
+    return e + 1 < number.size() && number[e + 1] == '-';
+  }
+  return number.find_first_of("123456789") > number.find('.');
+}
 
 /// Levenshtein distance, case ignored.
 std::size_t editDistance(std::string_view a, std::string_view b) {
@@ -76,10 +86,7 @@ std::optional<double> parseReal(std::string_view text) {
   double value = 0.0;
   const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
   if (end != text.data() + text.size() || text.empty()) return std::nullopt;
-  if (error == std::errc::result_out_of_range) {
-    // Too small for a double is a zero, too large is no number.
-    return std::abs(value) < 1.0 ? std::optional<double>(0.0) : std::nullopt;
-  }
+  if (error == std::errc::result_out_of_range) return isTooSmall(text) ? std::optional<double>(0.0) : std::nullopt;
   if (error != std::errc{}) return std::nullopt;
   return value;
 }

@@ -1,0 +1,96 @@
+#include "common/text.h"
+
+#include <cmath>
+#include <limits>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include <gtest/gtest.h>
+
+namespace mirevo {
+namespace {
+
+TEST(Text, ReadsRealsInEveryFormAndNothingElse) {
+  const struct {
+    const char* text;
+    std::optional<double> value;
+  } cases[] = {
+      {"1", 1.0},
+      {" -2.5\t", -2.5},
+      {"+.5", 0.5},
+      {"1.", 1.0},
+      {"1.5E-035", 1.5e-35},
+      {"1.5d3", 1500.0},
+      {"-1D+2", -100.0},
+      {"1e-999", 0.0},
+      {"1e999", {}},
+      {"-1e999", {}},
+      {"", {}},
+      {"+", {}},
+      {"+-1", {}},
+      {"1 2", {}},
+      {"0x10", {}},
+      {"nan", {}},
+      {"inf", {}},
+      {"1e", {}},
+      {"1,5", {}},
+      {"1e5e5", {}},
+      {"--1", {}},
+      {"1d5d", {}},
+      {"4.9e-324", 4.9e-324},
+      {".", {}},
+  };
+  for (const auto& c : cases) EXPECT_EQ(parseReal(c.text), c.value) << c.text;
+  EXPECT_EQ(parseReal("0." + std::string(400, '0') + "1"), 0.0);
+  EXPECT_EQ(parseReal("1" + std::string(400, '0')), std::nullopt);
+}
+
+TEST(Text, ReadsIntegersWithin32Bits) {
+  const struct {
+    const char* text;
+    std::optional<std::int32_t> value;
+  } cases[] = {
+      {"0", 0},           {"+7", 7},   {" -2147483648 ", std::numeric_limits<std::int32_t>::min()},
+      {"2147483648", {}}, {"1.0", {}}, {"", {}},
+      {"+-3", {}},        {"1e3", {}},
+  };
+  for (const auto& c : cases) EXPECT_EQ(parseInteger(c.text), c.value) << c.text;
+}
+
+TEST(Text, WritesRealsThatReadBackAsTheSameBits) {
+  for (const double value : {0.1, -1.0 / 3.0, 1e30, 5e-324, 1.7976931348623157e308, -0.0, 123456789.125}) {
+    const auto back = parseReal(formatReal(value));
+    ASSERT_TRUE(back.has_value()) << formatReal(value);
+    EXPECT_EQ(*back, value);
+    EXPECT_EQ(std::signbit(*back), std::signbit(value));
+  }
+  EXPECT_EQ(formatReal(std::nan("")), "NaN");
+  EXPECT_EQ(formatReal(-std::numeric_limits<double>::infinity()), "-Inf");
+}
+
+TEST(Text, SuggestsTheNearestNameAndNoFarOne) {
+  const std::vector<std::string> names = {"Initial_Value", "Lower_Bound", "Upper_Bound", "Title"};
+  EXPECT_EQ(nearestName("Intial_Value", names), "Initial_Value");
+  EXPECT_EQ(nearestName("upper_bound", names), "Upper_Bound");
+  EXPECT_EQ(nearestName("Ttle", names), "Title");
+  EXPECT_EQ(nearestName("Weight", names), std::nullopt);
+  EXPECT_EQ(nearestName("", names), std::nullopt);
+}
+
+TEST(Text, SplitsLinesAtEitherLineEnd) {
+  using Lines = std::vector<std::string_view>;
+  EXPECT_EQ(splitLines("a\r\nb\n\nc"), (Lines{"a", "b", "", "c"}));
+  EXPECT_EQ(splitLines("a\n"), (Lines{"a"}));
+  EXPECT_EQ(splitLines(""), Lines{});
+}
+
+TEST(Text, TrimsAndReplacesNumbers) {
+  EXPECT_EQ(trimTrailing("  a b \t\r"), "  a b");
+  EXPECT_EQ(trim(" \n a b \t"), "a b");
+  EXPECT_EQ(withNumber("Evaluation of parameter set No. % completed: OK", 12),
+            "Evaluation of parameter set No. 12 completed: OK");
+}
+
+}  // namespace
+}  // namespace mirevo
