@@ -26,11 +26,16 @@ class RunLog final {
   /// For signal handlers: -1 while no file is open.
   int descriptor() const { return descriptor_; }
   const std::string& path() const { return path_; }
+  /// What the system said when a record could first not be written ("No space left on device"); empty when all were.
+  const std::string& writeError() const { return writeError_; }
 
  private:
+  void write(std::string_view record);
+
   int descriptor_ = -1;
   std::string path_;
-  std::string pending_;
+  std::string pending_;  ///< what was said before the file was open
+  std::string writeError_;
 };
 
 }  // namespace mirevo
