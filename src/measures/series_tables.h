@@ -1,6 +1,7 @@
 #pragma once
 
 #include <memory>
+#include <optional>
 #include <span>
 #include <string>
 #include <vector>
@@ -18,9 +19,14 @@ class SeriesTables final {
   /// interface type 1 name no series. Throws FatalError with the fixed texts.
   static SeriesTables MirevoTSobjectInit(std::span<const OutputMeasure> measures);
 
-  /// Opens the simulation files of one evaluation, in table order. `locate` turns a simulation file name of the setup
-  /// into the path in the slot's folder.
+  /// Opens the simulation files of one evaluation: `paths[i]` is where simulationFileNames()[i] lies in the slot's
+  /// folder. Files still open are released first. Throws FatalError as openTimeSeries() does.
   void openSimulationFiles(std::span<const std::string> paths);
+  /// The same for results that a model run may have left unusable: one line for a person, with everything released
+  /// again, when a file cannot be opened or has no time step, or when a measured item cannot be read or has no value
+  /// that is not missing; nothing when the files stand open for the measures. An item number that a file does not have
+  /// is left to the measures, which end the run by it.
+  std::optional<std::string> tryOpenSimulationFiles(std::span<const std::string> paths);
   void releaseSimulationFiles();
 
   const std::vector<std::string>& observationFileNames() const { return observationNames_; }
@@ -35,6 +41,7 @@ class SeriesTables final {
   std::vector<std::string> simulationNames_;
   std::vector<std::size_t> observationIndex_;  ///< one a measure, 0-based
   std::vector<std::size_t> simulationIndex_;
+  std::vector<std::vector<int>> simulationItems_;  ///< one a simulation file: the item numbers that measures name
   std::vector<std::unique_ptr<TimeSeriesObject>> observations_;
   std::vector<std::unique_ptr<TimeSeriesObject>> simulations_;
 };
