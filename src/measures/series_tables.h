@@ -16,7 +16,8 @@ namespace mirevo {
 class SeriesTables final {
  public:
   /// Opens every observation file and, once as a check, every simulation file, and releases those again. Measures of
-  /// interface type 1 name no series. Throws FatalError with the fixed texts.
+  /// interface type 1 name no series. Item numbers that a file does not have and observations that cannot be read are
+  /// found here too, before a model has run. Throws FatalError with the fixed texts.
   static SeriesTables MirevoTSobjectInit(std::span<const OutputMeasure> measures);
 
   /// Opens the simulation files of one evaluation: `paths[i]` is where simulationFileNames()[i] lies in the slot's
@@ -37,6 +38,10 @@ class SeriesTables final {
   TimeSeriesObject& simulation(std::size_t measure);
 
  private:
+  static constexpr std::size_t kNoSeries = static_cast<std::size_t>(-1);  ///< index of a measure of interface type 1
+
+  void checkItems(std::span<const OutputMeasure> measures);
+
   std::vector<std::string> observationNames_;
   std::vector<std::string> simulationNames_;
   std::vector<std::size_t> observationIndex_;  ///< one a measure, 0-based
