@@ -1,9 +1,8 @@
 #pragma once
 
-#include <optional>
-#include <string>
 #include <vector>
 
+#include "measures/measure_file.h"
 #include "measures/output_measure.h"
 #include "platform/time_series_object.h"
 
@@ -19,8 +18,14 @@ struct MeasureStatistics {
   std::vector<float> simulatedValues;  ///< at the observation times that were used
 };
 
-/// Statistics of simulated minus observed values in the period; the peaks only where `wantPeaks`. Throws FatalError
-/// with the fixed texts.
+/// Makes the item of an opened file ready for reading. Throws FatalError with "Error: Item No. % not found in " or
+/// "Error getting data of TS item in " and the file's name.
+void requireItem(TimeSeriesObject& series, const SeriesReference& reference);
+
+/// Statistics of simulated minus observed values, weighted: `weight` times the difference where it is not positive,
+/// `weightAbove` times it where it is. Both ends of the period belong to it. Observations that are missing, and those
+/// at whose time there is no simulated value, do not count. The peaks and lows only where `wantPeaks`. The two files
+/// may start at different times; equal civil times meet exactly. Throws FatalError with the fixed texts.
 MeasureStatistics computeMeasureStatistics(const OutputMeasure& measure, const EvaluationPeriod& period,
                                            TimeSeriesObject& simulation, TimeSeriesObject& observation, float weight,
                                            float weightAbove, bool wantPeaks);
@@ -28,9 +33,5 @@ MeasureStatistics computeMeasureStatistics(const OutputMeasure& measure, const E
 /// The value of a measure of interface type 0: the statistic that its `Statistic_Type` selects.
 double measureValue(const OutputMeasure& measure, const EvaluationPeriod& period, TimeSeriesObject& simulation,
                     TimeSeriesObject& observation);
-
-/// The numbers of an output-measure file in free format: separated by blanks, tabs, commas, semicolons or line ends,
-/// `#` comments to the end of the line. Nothing, with the place in `reason`, when something in it is no number.
-std::optional<std::vector<double>> readMeasureFile(const std::string& fileName, std::string& reason);
 
 }  // namespace mirevo

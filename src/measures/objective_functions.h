@@ -42,8 +42,10 @@ class ObjectiveAggregator final {
   bool isSettled() const;
   /// The aggregate, NaN while it is not settled.
   double aggregate(std::span<const double> objectiveValues) const;
-  /// Takes the missing σ and μ from the initial sample: one row of objective values an evaluation that succeeded.
-  /// Throws FatalError naming an objective function that is constant over the sample.
+  /// Takes the missing σ and μ from the initial sample: one row of objective values an evaluation that succeeded, at
+  /// least two of them. σ is the sample's standard deviation (divisor n - 1); μ its mean on the probability scale, and
+  /// on the distance scale max over j of best_j/σ_j, less best_i/σ_i, so that every best value comes to lie at the same
+  /// distance from zero. Throws FatalError naming an objective function that is constant over the sample.
   void fit(std::span<const std::vector<double>> sample);
 
   AggregationMethod method() const { return method_; }

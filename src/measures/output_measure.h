@@ -28,10 +28,10 @@ struct OutputMeasure {
   InterfaceType interfaceType = InterfaceType::timeSeries;
   std::int32_t measurementNo = 1;  ///< which number of the output-measure file, from 1
   StatisticType statisticType = StatisticType::mean;
-  double weight = 1.0;        ///< of simulations at or below the observation
-  double weightAbove = 1.0;   ///< of simulations above it
-  std::string functionName;   ///< the objective function it belongs to; empty: none
-  SeriesReference simulation; ///< in or below the base folder
+  double weight = 1.0;         ///< of simulations at or below the observation
+  double weightAbove = 1.0;    ///< of simulations above it
+  std::string functionName;    ///< the objective function it belongs to; empty: none
+  SeriesReference simulation;  ///< in or below the base folder
   SeriesReference observation;
 };
 

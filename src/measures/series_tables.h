@@ -1,6 +1,7 @@
 #pragma once
 
 #include <memory>
+#include <optional>
 #include <span>
 #include <string>
 #include <vector>
@@ -15,12 +16,18 @@ namespace mirevo {
 class SeriesTables final {
  public:
   /// Opens every observation file and, once as a check, every simulation file, and releases those again. Measures of
-  /// interface type 1 name no series. Throws FatalError with the fixed texts.
+  /// interface type 1 name no series. Item numbers that a file does not have and observations that cannot be read are
+  /// found here too, before a model has run. Throws FatalError with the fixed texts.
   static SeriesTables MirevoTSobjectInit(std::span<const OutputMeasure> measures);
 
-  /// Opens the simulation files of one evaluation, in table order. `locate` turns a simulation file name of the setup
-  /// into the path in the slot's folder.
+  /// Opens the simulation files of one evaluation: `paths[i]` is where simulationFileNames()[i] lies in the slot's
+  /// folder. Files still open are released first. Throws FatalError as openTimeSeries() does.
   void openSimulationFiles(std::span<const std::string> paths);
+  /// The same for results that a model run may have left unusable: one line for a person, with everything released
+  /// again, when a file cannot be opened or has no time step, or when a measured item cannot be read or has no value
+  /// that is not missing; nothing when the files stand open for the measures. An item number that a file does not have
+  /// is left to the measures, which end the run by it.
+  std::optional<std::string> tryOpenSimulationFiles(std::span<const std::string> paths);
   void releaseSimulationFiles();
 
   const std::vector<std::string>& observationFileNames() const { return observationNames_; }
@@ -31,10 +38,15 @@ class SeriesTables final {
   TimeSeriesObject& simulation(std::size_t measure);
 
  private:
+  static constexpr std::size_t kNoSeries = static_cast<std::size_t>(-1);  ///< index of a measure of interface type 1
+
+  void checkItems(std::span<const OutputMeasure> measures);
+
   std::vector<std::string> observationNames_;
   std::vector<std::string> simulationNames_;
   std::vector<std::size_t> observationIndex_;  ///< one a measure, 0-based
   std::vector<std::size_t> simulationIndex_;
+  std::vector<std::vector<int>> simulationItems_;  ///< one a simulation file: the item numbers that measures name
   std::vector<std::unique_ptr<TimeSeriesObject>> observations_;
   std::vector<std::unique_ptr<TimeSeriesObject>> simulations_;
 };

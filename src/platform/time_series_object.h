@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <memory>
 #include <optional>
 #include <span>
@@ -43,8 +44,20 @@ class TimeSeriesObject {
 /// names the known endings.
 std::unique_ptr<TimeSeriesObject> createTimeSeriesObject(const std::string& fileName, std::string& reason);
 
-/// Value at a time (days since the object's start): that of the step there, else linear between its two neighbours;
-/// nothing outside the axis or beside a missing neighbour. The item's data must be available.
+/// Two times of one axis closer than half a millisecond (in days) are the same time: far above the rounding of days in
+/// 64 bits over thousands of years, far below any time step.
+inline constexpr double kSameTimeDays = 0.5e-3 / 86400.0;
+
+/// Whether a value marks a gap: the delete value, or no number.
+inline bool isMissing(float value, std::optional<float> deleteValue) {
+  return value != value || (deleteValue && value == *deleteValue);
+}
+
+/// Value at a time (days since the object's start): that of the step there, else linear between its two neighbours,
+/// computed in 64 bits and rounded once to 32; nothing outside the axis or beside a missing neighbour. The item's data
+/// must be available. `hint` is a step (0-based) near which the search begins and where it ended: callers that walk
+/// along an axis pass the same variable again and find each value in constant time.
+std::optional<float> valueAt(const TimeSeriesObject& series, int item, double days, std::size_t& hint);
 std::optional<float> valueAt(const TimeSeriesObject& series, int item, double days);
 
 /// Largest and smallest value that is not missing with start <= t <= end; nothing when there is none.

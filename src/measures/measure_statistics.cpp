@@ -1,0 +1,179 @@
+#include "measures/measure_statistics.h"
+
+#include <algorithm>
+#include <cmath>
+#include <limits>
+#include <span>
+#include <string>
+
+#include <fmt/format.h>
+
+#include "common/calendar.h"
+#include "common/fatal_error.h"
+#include "common/text.h"
+#include "measures/dates.h"
+
+namespace mirevo {
+namespace {
+
+/// A measure's item in an opened file, with its axis.
+struct SeriesItem {
+  const TimeSeriesObject& series;
+  int item;
+  std::string fileName;
+  DateRecord start;
+  std::optional<float> deleteValue;
+};
+
+/// A span of time in days since the start of a file.
+struct Period {
+  double start;
+  double end;
+};
+
+SeriesItem readItem(TimeSeriesObject& series, const SeriesReference& reference) {
+  const std::string name(trimTrailing(reference.fileName));
+  requireItem(series, reference);
+  const std::optional<DateRecord> start = series.startTime();
+  if (!start) fatalError("Error getting time properties of TS object of file " + name, "the file has no time step");
+  const std::optional<float> deleteValue = series.deleteValue();
+  if (!deleteValue) fatalError("Error getting delete value of TS object of file " + name, series.lastError());
+  if (series.times().size() != static_cast<std::size_t>(series.timeStepCount())) {
+    fatalError("Error getting time step of TS object in " + name, series.lastError());
+  }
+  return {series, reference.itemNo, name, *start, deleteValue};
+}
+
+Period periodOn(const DateRecord& axisStart, const EvaluationPeriod& period) {
+  return {daysSince(axisStart, period.start), daysSince(axisStart, period.end)};
+}
+
+/// The weighted difference of a simulated and an observed value.
+float weightedDifference(float simulated, float observed, float weight, float weightAbove) {
+  const float difference = simulated - observed;
+  return difference <= 0.0F ? weight * difference : weightAbove * difference;
+}
+
+std::string describeSpan(const SeriesItem& item) {
+  const std::span<const double> times = item.series.times();
+  return fmt::format("{} begins {} and has {} time steps over {} days", item.fileName, formatDate(item.start),
+                     times.size(), formatReal(times.back() - times.front()));
+}
+
+/// Mean, rms and standard deviation over the pairs in the period. Single precision, in observation order: deliberate.
+void addPairStatistics(const SeriesItem& simulation, const SeriesItem& observation, const EvaluationPeriod& period,
+                       float weight, float weightAbove, MeasureStatistics& statistics) {
+  const Period days = periodOn(simulation.start, period);
+  // Observation times on the simulation's axis: one offset of whole seconds, so equal civil times differ by rounding
+  // only, which is far below what counts as the same time.
+  const double offset = daysSince(simulation.start, observation.start);
+  const std::span<const double> times = observation.series.times();
+  const std::span<const float> observed = observation.series.values(observation.item);
+  std::size_t hint = 0;
+  float sum = 0.0F;
+  float sumOfSquares = 0.0F;
+  for (std::size_t k = 0; k < times.size(); ++k) {
+    const double time = times[k] + offset;
+    if (time < days.start - kSameTimeDays) continue;
+    if (time > days.end + kSameTimeDays) break;
+    if (isMissing(observed[k], observation.deleteValue)) continue;
+    const std::optional<float> simulated = valueAt(simulation.series, simulation.item, time, hint);
+    if (!simulated) continue;
+    statistics.simulatedValues.push_back(*simulated);
+    const float e = weightedDifference(*simulated, observed[k], weight, weightAbove);
+    sum += e;
+    sumOfSquares += e * e;
+  }
+  if (statistics.simulatedValues.empty()) {
+    fatalError(withNumber("Error: No simulated data found at observation times for item No. % in ", simulation.item) +
+                   simulation.fileName,
+               fmt::format("the evaluation period is {} to {}\n{}\n{}", formatDate(period.start),
+                           formatDate(period.end), describeSpan(simulation), describeSpan(observation)));
+  }
+  const auto n = static_cast<float>(statistics.simulatedValues.size());
+  statistics.mean = sum / n;
+  statistics.rootMeanSquare = std::sqrt(sumOfSquares / n);
+  const float v = statistics.rootMeanSquare * statistics.rootMeanSquare - statistics.mean * statistics.mean;
+  // A v of zero, or slightly below it by rounding, is kept as it is: deliberately not clipped.
+  statistics.standardDeviation = v > 0.0F ? std::sqrt(v) : v;
+}
+
+/// Peak and low difference over the period, cut to the simulated item's time span.
+void addPeakStatistics(const SeriesItem& simulation, const SeriesItem& observation, const EvaluationPeriod& period,
+                       float weight, float weightAbove, MeasureStatistics& statistics) {
+  const std::span<const double> times = simulation.series.times();
+  Period cut = periodOn(simulation.start, period);
+  cut = {std::max(cut.start, times.front()), std::min(cut.end, times.back())};
+  if (cut.end < cut.start) {
+    fatalError("Error: Invalid time period defined for extracting max or min in " + simulation.fileName,
+               fmt::format("the evaluation period is {} to {}\n{}", formatDate(period.start), formatDate(period.end),
+                           describeSpan(simulation)));
+  }
+  const double offset = daysSince(observation.start, simulation.start);
+  const Period observedCut{cut.start + offset, cut.end + offset};
+  const auto extract = [](auto&& extractValue, const SeriesItem& item, const Period& span, std::string_view what) {
+    const std::optional<float> value = extractValue(item.series, item.item, span.start, span.end);
+    if (!value) {
+      fatalError(
+          fmt::format("Error extracting {} value of TS item in {}", what, item.fileName),
+          fmt::format("item No. {} has no value that is not missing in the period\n{}", item.item, describeSpan(item)));
+    }
+    return *value;
+  };
+  const float observedMax = extract(extractMaxValue, observation, observedCut, "max");
+  const float simulatedMax = extract(extractMaxValue, simulation, cut, "max");
+  statistics.peakDifference = weightedDifference(simulatedMax, observedMax, weight, weightAbove);
+  const float observedMin = extract(extractMinValue, observation, observedCut, "min");
+  const float simulatedMin = extract(extractMinValue, simulation, cut, "min");
+  statistics.lowDifference = weightedDifference(simulatedMin, observedMin, weight, weightAbove);
+}
+
+}  // namespace
+
+void requireItem(TimeSeriesObject& series, const SeriesReference& reference) {
+  const std::string name(trimTrailing(reference.fileName));
+  if (reference.itemNo < 1 || reference.itemNo > series.itemCount()) {
+    std::string detail = fmt::format("the file has {} item{}", series.itemCount(), series.itemCount() == 1 ? "" : "s");
+    constexpr int kMostNames = 20;
+    for (int item = 1; item <= std::min(series.itemCount(), kMostNames); ++item) {
+      detail += fmt::format("\n{}: {}", item, series.itemName(item));
+    }
+    fatalError(withNumber("Error: Item No. % not found in ", reference.itemNo) + name, detail);
+  }
+  if (!series.getData(reference.itemNo)) fatalError("Error getting data of TS item in " + name, series.lastError());
+}
+
+MeasureStatistics computeMeasureStatistics(const OutputMeasure& measure, const EvaluationPeriod& period,
+                                           TimeSeriesObject& simulation, TimeSeriesObject& observation, float weight,
+                                           float weightAbove, bool wantPeaks) {
+  const SeriesItem simulated = readItem(simulation, measure.simulation);
+  const SeriesItem observed = readItem(observation, measure.observation);
+  MeasureStatistics statistics;
+  addPairStatistics(simulated, observed, period, weight, weightAbove, statistics);
+  if (wantPeaks) addPeakStatistics(simulated, observed, period, weight, weightAbove, statistics);
+  return statistics;
+}
+
+double measureValue(const OutputMeasure& measure, const EvaluationPeriod& period, TimeSeriesObject& simulation,
+                    TimeSeriesObject& observation) {
+  const bool wantPeaks =
+      measure.statisticType == StatisticType::peakDifference || measure.statisticType == StatisticType::lowDifference;
+  const MeasureStatistics statistics =
+      computeMeasureStatistics(measure, period, simulation, observation, static_cast<float>(measure.weight),
+                               static_cast<float>(measure.weightAbove), wantPeaks);
+  switch (measure.statisticType) {
+    case StatisticType::mean:
+      return statistics.mean;
+    case StatisticType::rootMeanSquare:
+      return statistics.rootMeanSquare;
+    case StatisticType::standardDeviation:
+      return statistics.standardDeviation;
+    case StatisticType::peakDifference:
+      return statistics.peakDifference;
+    case StatisticType::lowDifference:
+      return statistics.lowDifference;
+  }
+  return std::numeric_limits<double>::quiet_NaN();
+}
+
+}  // namespace mirevo

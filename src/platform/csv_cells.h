@@ -1,0 +1,67 @@
+#pragma once
+
+#include <array>
+#include <cstdint>
+#include <cstring>
+#include <optional>
+#include <string_view>
+
+#include "common/calendar.h"
+
+/// The cells of one CSV line, as ranges of characters. Quotes toggle: a separator between two of them separates
+/// nothing.
+namespace mirevo::csv {
+
+inline bool isBlank(char c) {
+  return c == ' ' || c == '\t';
+}
+
+/// The end of the line that starts at `line`: its '\n', or `end`.
+inline const char* endOfLine(const char* line, const char* end) {
+  const void* newline = std::memchr(line, '\n', static_cast<std::size_t>(end - line));
+  return newline != nullptr ? static_cast<const char*>(newline) : end;
+}
+
+/// The end of the line without a carriage return before it.
+inline const char* trimReturn(const char* line, const char* lineEnd) {
+  return lineEnd > line && lineEnd[-1] == '\r' ? lineEnd - 1 : lineEnd;
+}
+
+/// The separator that ends the cell beginning at `cell`, or `end`.
+inline const char* endOfCell(const char* cell, const char* end, char separator) {
+  bool quoted = false;
+  for (; cell != end && (quoted || *cell != separator); ++cell) {
+    if (*cell == '"') quoted = !quoted;
+  }
+  return cell;
+}
+
+/// Number of separators between `begin` and `end`; without quotes the faster count.
+int countSeparators(const char* begin, const char* end, char separator, bool mayHaveQuotes);
+
+/// The beginning of the cell before the one that begins at `cell`, which must not be the line's first.
+const char* previousCell(const char* cell, char separator);
+
+/// A cell's meaning: without blanks around it and without the quotes around that.
+std::string_view cellText(const char* begin, const char* end);
+
+/// The seconds (see secondNumber()) of dates as text. Remembers the last day, as one day has many rows.
+class DateScanner final {
+ public:
+  /// Reads `YYYY-MM-DD`, or that with ` HH:MM` or `THH:MM` and optional `:SS`, at `at` and moves `at` past it; nothing,
+  /// with `at` anywhere, when there is no valid date.
+  std::optional<std::int64_t> scan(const char*& at, const char* end);
+  /// scan() of a whole cell: blanks around the date and quotes around that are allowed. `at` is left on what follows.
+  std::optional<std::int64_t> scanCell(const char*& at, const char* end);
+
+ private:
+  std::optional<std::int64_t> scanDay(const char* at);
+
+  std::array<char, 10> lastDay_{'0', '0', '0', '0', '-', '0', '3', '-', '0', '1'};
+  std::int64_t lastDaySecond_ = 0;
+};
+
+/// A value cell: a number, or NaN where it is empty, NaN or NA; nothing when it is neither or beyond 32-bit range.
+std::optional<float> parseCell(const char* begin, const char* end);
+
+}  // namespace mirevo::csv

@@ -1,0 +1,123 @@
+#include "measures/objective_functions.h"
+
+#include <cmath>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "common/fatal_error.h"
+
+namespace mirevo {
+namespace {
+
+using ::testing::DoubleNear;
+using ::testing::ElementsAre;
+using ::testing::HasSubstr;
+
+ObjectiveFunction function(std::string name, FunctionType type, std::vector<std::size_t> measures) {
+  ObjectiveFunction f;
+  f.name = std::move(name);
+  f.functionType = type;
+  f.measures = std::move(measures);
+  return f;
+}
+
+TEST(ObjectiveFunctions, CombineTheirMeasuresByType) {
+  const std::vector<ObjectiveFunction> functions{function("sum", FunctionType::sum, {0, 1}),
+                                                 function("abs", FunctionType::sumOfAbsolutes, {0, 1}),
+                                                 function("sq", FunctionType::sumOfSquares, {0, 1}),
+                                                 function("none", FunctionType::sumOfSquares, {}),
+                                                 function("unknown", static_cast<FunctionType>(3), {0, 1}),
+                                                 function("twice", FunctionType::sum, {2, 2})};
+  const std::vector<double> measures{-1.0, 2.0, 0.5};
+  EXPECT_THAT(objectiveFunctionValues(functions, measures), ElementsAre(1.0, 3.0, 5.0, 0.0, 0.0, 1.0));
+}
+
+TEST(ObjectiveFunctions, AggregateByMethod) {
+  struct Case {
+    std::vector<double> values, weights, sigma, mu;
+    AggregationMethod method;
+    double expected;
+  };
+  const double phiOfOne = 0.8413447460685429;  // standard normal distribution at 1, as tabulated
+  const Case cases[] = {
+      {{2, 3}, {1, 0.5}, {}, {}, AggregationMethod::none, 3.5},
+      {{4}, {1}, {2}, {1}, AggregationMethod::commonDistance, 3.0},
+      {{4, 6}, {1, 2}, {2, 3}, {1, -1}, AggregationMethod::commonDistance, 5.0},
+      {{7, 7}, {3, 1}, {2, 5}, {7, 7}, AggregationMethod::commonProbability, 2.0},
+      {{5}, {2}, {4}, {1}, AggregationMethod::commonProbability, 2 * phiOfOne},
+      {{-3}, {1}, {4}, {1}, AggregationMethod::commonProbability, 1 - phiOfOne},
+      {{7, 7}, {3, 1}, {2, 5}, {7, 7}, AggregationMethod::zero, 0.0},
+      {{7}, {3}, {2}, {7}, static_cast<AggregationMethod>(9), 0.0},
+      {{}, {}, {}, {}, AggregationMethod::none, 0.0},
+      {{}, {}, {}, {}, AggregationMethod::commonProbability, 0.0},
+      {{3}, {1}, {0}, {1}, AggregationMethod::commonDistance, INFINITY},  // a zero σ is not guarded here
+  };
+  for (const Case& c : cases) {
+    const double aggregate = aggregateObjective(c.values, c.weights, c.sigma, c.mu, c.method);
+    if (std::isinf(c.expected)) {
+      EXPECT_EQ(aggregate, c.expected);
+    } else {
+      EXPECT_NEAR(aggregate, c.expected, 1e-15);
+    }
+  }
+}
+
+TEST(ObjectiveAggregator, TakesWhatTheSetupLeavesOpenFromTheSample) {
+  // Standard deviations 1 and 10, means 2 and 30, best values 1 and 20.
+  const std::vector<std::vector<double>> sample{{1, 40}, {2, 30}, {3, 20}};
+  std::vector<ObjectiveFunction> functions{function("Q", FunctionType::sum, {0}),
+                                           function("H", FunctionType::sum, {1})};
+  functions[1].weight = 0.5;
+
+  ObjectiveAggregator probability(functions, AggregationMethod::commonProbability);
+  EXPECT_FALSE(probability.isSettled());
+  EXPECT_TRUE(std::isnan(probability.aggregate(sample[0])));
+  probability.fit(sample);
+  EXPECT_TRUE(probability.isSettled());
+  EXPECT_THAT(probability.sigma(), ElementsAre(DoubleNear(1, 1e-14), DoubleNear(10, 1e-13)));
+  EXPECT_THAT(probability.mu(), ElementsAre(DoubleNear(2, 1e-14), DoubleNear(30, 1e-13)));
+  EXPECT_NEAR(probability.aggregate(sample[1]), 0.75, 1e-14);
+
+  // best/σ are 1 and 2: the offset of Q is 1, so that both best values lie at 2.
+  ObjectiveAggregator distance(functions, AggregationMethod::commonDistance);
+  distance.fit(sample);
+  EXPECT_THAT(distance.mu(), ElementsAre(DoubleNear(1, 1e-14), DoubleNear(0, 1e-14)));
+  EXPECT_NEAR(distance.aggregate(std::vector<double>{1, 20}), 2 + 0.5 * 2, 1e-13);
+
+  // What the setup gives stays, also against the sample.
+  functions[0].standardDeviation = 4.0;
+  functions[0].location = -7.0;
+  ObjectiveAggregator given(functions, AggregationMethod::commonDistance);
+  given.fit(sample);
+  EXPECT_EQ(given.sigma()[0], 4.0);
+  EXPECT_EQ(given.mu()[0], -7.0);
+
+  for (const AggregationMethod method : {AggregationMethod::none, AggregationMethod::zero}) {
+    EXPECT_TRUE(ObjectiveAggregator(functions, method).isSettled());
+  }
+}
+
+TEST(ObjectiveAggregator, RefusesAnObjectiveFunctionWithoutSpreadByName) {
+  std::vector<ObjectiveFunction> functions{function("Q", FunctionType::sum, {0}),
+                                           function("low flow", FunctionType::sum, {1})};
+  // 0.1 three times has a mean that is not 0.1 in 64 bits; it is constant nonetheless.
+  const std::vector<std::vector<double>> sample{{1, 0.1}, {2, 0.1}, {3, 0.1}};
+  ObjectiveAggregator aggregator(functions, AggregationMethod::commonProbability);
+  try {
+    aggregator.fit(sample);
+    ADD_FAILURE() << "accepted";
+  } catch (const FatalError& error) {
+    EXPECT_EQ(error.message(), "Error: Objective function \"low flow\" has no spread over the initial sample");
+    EXPECT_THAT(error.detail(), HasSubstr("gave 0.1,"));
+    EXPECT_THAT(error.detail(), HasSubstr("Standard_Deviation"));
+  }
+  functions[1].standardDeviation = 1.0;
+  ObjectiveAggregator withScale(functions, AggregationMethod::commonProbability);
+  EXPECT_NO_THROW(withScale.fit(sample));
+  ObjectiveAggregator tooFew(functions, AggregationMethod::commonDistance);
+  EXPECT_THROW(tooFew.fit(std::span(sample).first(1)), FatalError);
+}
+
+}  // namespace
+}  // namespace mirevo
