@@ -1,0 +1,71 @@
+#pragma once
+
+#include <atomic>
+#include <memory>
+#include <string>
+#include <sys/types.h>
+#include <vector>
+
+#include "platform/child_guard.h"
+#include "platform/process_groups.h"
+#include "platform/process_launcher.h"
+#include "platform/spawn_process.h"
+
+namespace mirevo {
+
+/// Runs batches as processes of this machine. A batch's item is a process group of its own; `mirevo_batch.log` in the
+/// slot's folder takes what the batch prints. When an item's first process ends, others of its group that still run are
+/// ended. No process of a batch outlives this program, however it ends; only one that has left its group on purpose
+/// (a daemon) is out of reach.
+class PosixProcessLauncher final : public ProcessLauncher {
+ public:
+  PosixProcessLauncher() = default;
+  ~PosixProcessLauncher() override;
+
+  bool initialise(const LauncherSettings& settings) override;
+  const std::string& lastError() const override { return lastError_; }
+  std::string getProcessFolder(int slot) const override;
+  void createProcesses(int slot) override;
+  void isExecuting(int slot, std::int32_t& executing, std::int32_t& status) override;
+  BatchFailure failure(int slot) const override;
+  std::string leftBehind(int slot) const override;
+  std::vector<std::string> lastOutput(int slot, int lineCount) const override;
+  void waitForChange(double seconds) override;
+  void haltProcesses() override;
+  ResistanceUpdate r35UpdateResistanceNumbers(const std::string& fileName) override;
+
+ private:
+  struct Slot {
+    std::string folder;
+    std::vector<SpawnCommand> commands;  ///< one a batch item
+    std::size_t item = 0;                ///< that runs, or ran last
+    int pidfd = -1;                      ///< -1 while nothing runs
+    pid_t group = 0;
+    int log = -1;  ///< open for the whole run, so that a run that prints nothing makes no file
+    BatchFailure failure;
+    std::string leftBehind;
+  };
+
+  Slot& slotAt(int slot) { return slots_.at(static_cast<std::size_t>(slot - 1)); }
+  const Slot& slotAt(int slot) const { return slots_.at(static_cast<std::size_t>(slot - 1)); }
+  void prepareSlot(const LauncherSettings& settings, int number,
+                   const std::vector<std::vector<std::string>>& arguments);
+  void prepareEnvironment(bool useSingleThread);
+  bool renewLog(Slot& slot);
+  void startItem(Slot& slot);
+  void finishItem(Slot& slot, int code, int status);
+  void endRestOfGroup(Slot& slot);
+  void closeDescriptors();
+  std::atomic<pid_t>& groupEntry(const Slot& slot) const;
+
+  std::string lastError_;
+  double graceSeconds_ = 0.0;
+  std::vector<Slot> slots_;
+  std::vector<std::string> environmentTexts_;
+  std::vector<char*> environment_;
+  int nullInput_ = -1;
+  std::unique_ptr<ProcessGroupTable> groups_;
+  std::unique_ptr<ChildGuard> guard_;
+};
+
+}  // namespace mirevo

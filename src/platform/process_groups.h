@@ -1,0 +1,48 @@
+#pragma once
+
+#include <atomic>
+#include <span>
+#include <string>
+#include <sys/types.h>
+#include <vector>
+
+namespace mirevo {
+
+/// The process groups that run at present, one entry a slot (0 = none). The memory is shared with processes forked
+/// later, so that the guard reads what its parent and the children have written; nothing is locked, so that a signal
+/// handler may read it.
+class ProcessGroupTable final {
+ public:
+  /// Throws std::bad_alloc when the memory cannot be had.
+  explicit ProcessGroupTable(int entryCount);
+  ~ProcessGroupTable();
+  ProcessGroupTable(const ProcessGroupTable&) = delete;
+  ProcessGroupTable& operator=(const ProcessGroupTable&) = delete;
+
+  std::span<std::atomic<pid_t>> entries() const noexcept { return entries_; }
+
+  /// Sends the signal to every group in the table. Async-signal-safe.
+  void signalAll(int signal) const noexcept;
+
+  /// Makes this the table that haltProcessesFromSignal() acts on, until it is destroyed.
+  void makeCurrent() noexcept;
+
+ private:
+  std::span<std::atomic<pid_t>> entries_;
+};
+
+/// Ends (SIGKILL) every model process that runs. Async-signal-safe: for signal handlers, which must not wait.
+void haltProcessesFromSignal() noexcept;
+
+/// A process found in a group.
+struct GroupMember {
+  pid_t id = 0;
+  pid_t group = 0;
+  std::string name;
+};
+
+/// The processes of these groups that still run (those that have ended and only wait to be reaped are left out), by a
+/// look through all processes of the system: some milliseconds.
+std::vector<GroupMember> runningMembers(std::span<const pid_t> groups);
+
+}  // namespace mirevo

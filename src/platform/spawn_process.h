@@ -1,0 +1,57 @@
+#pragma once
+
+#include <atomic>
+#include <memory>
+#include <string>
+#include <sys/types.h>
+#include <vector>
+
+namespace mirevo {
+
+/// A command made ready once, so that starting it allocates nothing.
+class SpawnCommand final {
+ public:
+  /// `file` is executed in `folder` with these arguments; both paths are absolute.
+  SpawnCommand(std::string file, std::string folder, std::vector<std::string> arguments);
+  SpawnCommand(SpawnCommand&&) = default;
+  SpawnCommand& operator=(SpawnCommand&&) = default;
+  SpawnCommand(const SpawnCommand&) = delete;
+  SpawnCommand& operator=(const SpawnCommand&) = delete;
+  ~SpawnCommand() = default;
+
+  const std::string& file() const { return *file_; }
+  const std::string& folder() const { return *folder_; }
+  /// Null-terminated `argv` with the file first; and the same after "/bin/sh".
+  char* const* argv() const { return shellArgv_.data() + 1; }
+  char* const* shellArgv() const { return shellArgv_.data(); }
+
+ private:
+  // Behind pointers: `shellArgv_` points into them and must go on doing so when the command is moved.
+  std::unique_ptr<std::string> file_;
+  std::unique_ptr<std::string> folder_;
+  std::unique_ptr<std::vector<std::string>> arguments_;
+  std::vector<char*> shellArgv_;
+};
+
+/// What a new process is given besides its command.
+struct SpawnSurroundings {
+  char* const* environment = nullptr;        ///< null-terminated
+  int standardInput = -1;                    ///< descriptor above 2
+  int standardOutput = -1;                   ///< descriptor above 2; standard error as well
+  std::atomic<pid_t>* groupEntry = nullptr;  ///< takes the group before the command can start a process of its own
+};
+
+/// A process that was started, or why it was not.
+struct SpawnedProcess {
+  pid_t id = -1;           ///< also its process group
+  int pidfd = -1;          ///< close-on-exec
+  int error = 0;           ///< errno; 0 when it runs
+  std::string failedStep;  ///< what could not be done: "started", "entered its folder"
+};
+
+/// Starts the command in a process group of its own with default signal handling, no descriptor above 2, and SIGKILL on
+/// the death of this process. A file with a run bit is executed (by /bin/sh when it has no "#!" line), any other is
+/// given to /bin/sh.
+SpawnedProcess spawnProcess(const SpawnCommand& command, const SpawnSurroundings& surroundings);
+
+}  // namespace mirevo
