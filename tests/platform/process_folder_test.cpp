@@ -1,0 +1,128 @@
+#include "platform/process_folder.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "common/fatal_error.h"
+#include "temporary_folder.h"
+
+namespace mirevo {
+namespace {
+
+namespace fs = std::filesystem;
+
+struct stat statusOf(const std::string& path) {
+  struct stat status {};
+  EXPECT_EQ(lstat(path.c_str(), &status), 0) << path;
+  return status;
+}
+
+TEST(ProcessFolder, CopiesFilesFoldersModesAndTimes) {
+  const TemporaryFolder folder;
+  folder.write("base/run.sh", "#!/bin/sh\n", 0755);
+  folder.write("base/in/read_only.txt", "1", 0444);
+  folder.write("base/in/deep/er/empty", "");
+  folder.write("base/large.bin", std::string(3'000'000, 'z') + "end");
+  fs::create_directory(folder / "base/none");
+  fs::permissions(folder / "base/in/deep", fs::perms::owner_read | fs::perms::owner_exec);
+  const timespec times[2] = {{1'000'000'000, 0}, {1'000'000'007, 5}};
+  utimensat(AT_FDCWD, (folder / "base/in/read_only.txt").c_str(), times, 0);
+
+  makeProcessFolder(folder / "base", folder / "run_Process1", folder / "run_Process");
+
+  EXPECT_EQ(statusOf(folder / "run_Process1/run.sh").st_mode & 07777, 0755u);
+  EXPECT_EQ(statusOf(folder / "run_Process1/in/read_only.txt").st_mode & 07777, 0444u);
+  EXPECT_EQ(statusOf(folder / "run_Process1/in/read_only.txt").st_mtim.tv_sec, 1'000'000'007);
+  EXPECT_EQ(folder.read("run_Process1/large.bin"), folder.read("base/large.bin"));
+  EXPECT_TRUE(folder.exists("run_Process1/in/deep/er/empty"));
+  EXPECT_TRUE(folder.exists("run_Process1/none"));
+}
+
+TEST(ProcessFolder, ReplacesWhatWasThere) {
+  const TemporaryFolder folder;
+  folder.write("base/run.sh", "new");
+  folder.write("run_Process1/run.sh", "old");
+  folder.write("run_Process1/left/over.txt", "old");
+  fs::permissions(folder / "run_Process1/left", fs::perms::owner_read | fs::perms::owner_exec);
+  folder.write("elsewhere/kept.txt", "kept");
+  fs::create_directory_symlink(folder / "elsewhere", folder / "run_Process1/link");
+
+  makeProcessFolder(folder / "base", folder / "run_Process1", folder / "run_Process");
+
+  EXPECT_EQ(folder.read("run_Process1/run.sh"), "new");
+  EXPECT_FALSE(folder.exists("run_Process1/left"));
+  EXPECT_EQ(folder.read("elsewhere/kept.txt"), "kept");
+}
+
+TEST(ProcessFolder, LinksLeadWhereTheyShould) {
+  const TemporaryFolder folder;
+  folder.write("setup/model/base/data/x.txt", "x");
+  folder.write("setup/model/shared/y.txt", "y");
+  const std::string base = folder / "setup/model/base";
+  fs::create_symlink("data/x.txt", base + "/inside_relative");
+  fs::create_symlink(base + "/data/x.txt", base + "/inside_absolute");
+  fs::create_symlink("../shared/y.txt", base + "/outside_relative");
+  fs::create_symlink(folder / "setup/model/shared/y.txt", base + "/outside_absolute");
+  fs::create_symlink("nowhere", base + "/dangling");
+  fs::create_symlink(".", base + "/data/loop");
+
+  const std::string copy = folder / "setup/run_Process1";
+  makeProcessFolder(base, copy, folder / "setup/run_Process");
+
+  const struct {
+    const char* name;
+    std::string target;
+  } cases[] = {
+      {"/inside_relative", "data/x.txt"},
+      {"/inside_absolute", copy + "/data/x.txt"},
+      {"/outside_relative", folder / "setup/model/shared/y.txt"},
+      {"/outside_absolute", folder / "setup/model/shared/y.txt"},
+      {"/dangling", "nowhere"},
+      {"/data/loop", "."},
+  };
+  for (const auto& c : cases) EXPECT_EQ(fs::read_symlink(copy + c.name).string(), c.target) << c.name;
+}
+
+// A setup that lies in the model's own folder has its process folders in what it copies.
+TEST(ProcessFolder, NeverCopiesProcessFolders) {
+  const TemporaryFolder folder;
+  folder.write("run.sh", "");
+  folder.write("cal_Process2/big.dat", "");                             // of this run
+  folder.write("other_Process1/" + std::string(kBatchLogName), "log");  // of another setup's run
+  folder.write("my_Process1/data.txt", "mine");                         // somebody's own: no batch log
+  folder.write("cal_Processes/data.txt", "mine");
+  for (int round = 0; round < 2; ++round)
+    makeProcessFolder(folder.path(), folder / "cal_Process1", folder / "cal_Process");
+
+  EXPECT_TRUE(folder.exists("cal_Process1/run.sh"));
+  EXPECT_FALSE(folder.exists("cal_Process1/cal_Process1"));
+  EXPECT_FALSE(folder.exists("cal_Process1/cal_Process2"));
+  EXPECT_FALSE(folder.exists("cal_Process1/other_Process1"));
+  EXPECT_TRUE(folder.exists("cal_Process1/my_Process1/data.txt"));
+  EXPECT_TRUE(folder.exists("cal_Process1/cal_Processes/data.txt"));
+}
+
+TEST(ProcessFolder, NamesThePathThatCannotBeCopied) {
+  const TemporaryFolder folder;
+  folder.write("base/run.sh", "");
+  try {
+    makeProcessFolder(folder / "base", folder / "no/such/run_Process1", folder / "no/such/run_Process");
+    FAIL();
+  } catch (const FatalError& error) {
+    EXPECT_EQ(error.message(),
+              "Unable to create the folder " + (folder / "no/such/run_Process1") + ": No such file or directory");
+  }
+  try {
+    makeProcessFolder(folder / "missing", folder / "run_Process1", folder / "run_Process");
+    FAIL();
+  } catch (const FatalError& error) {
+    EXPECT_EQ(error.message(), "Unable to read the folder " + (folder / "missing") + ": No such file or directory");
+  }
+}
+
+}  // namespace
+}  // namespace mirevo

@@ -1,0 +1,54 @@
+#pragma once
+
+#include <cstdlib>
+#include <filesystem>
+#include <fstream>
+#include <sstream>
+#include <string>
+#include <sys/stat.h>
+
+#include <gtest/gtest.h>
+
+namespace mirevo {
+
+/// A folder of its own for one test, removed at its end.
+class TemporaryFolder final {
+ public:
+  TemporaryFolder() {
+    std::string name = (std::filesystem::temp_directory_path() / "mirevo_test_XXXXXX").string();
+    if (mkdtemp(name.data()) == nullptr) throw std::filesystem::filesystem_error("mkdtemp", name, {});
+    path_ = name;
+  }
+  ~TemporaryFolder() {
+    std::error_code ignored;
+    std::filesystem::remove_all(path_, ignored);
+  }
+  TemporaryFolder(const TemporaryFolder&) = delete;
+  TemporaryFolder& operator=(const TemporaryFolder&) = delete;
+
+  const std::string& path() const { return path_; }
+  std::string operator/(const std::string& name) const { return path_ + "/" + name; }
+
+  /// Writes a file, with the folders above it; returns its path.
+  std::string write(const std::string& name, const std::string& content, unsigned mode = 0644) const {
+    const std::string path = *this / name;
+    std::filesystem::create_directories(std::filesystem::path(path).parent_path());
+    std::ofstream(path) << content;
+    ::chmod(path.c_str(), mode);
+    return path;
+  }
+
+  std::string read(const std::string& name) const {
+    std::ifstream file(*this / name);
+    std::ostringstream content;
+    content << file.rdbuf();
+    return content.str();
+  }
+
+  bool exists(const std::string& name) const { return std::filesystem::exists(*this / name); }
+
+ private:
+  std::string path_;
+};
+
+}  // namespace mirevo
