@@ -26,20 +26,21 @@ struct ModelDescription {
   std::vector<ObjectiveFunction> objectives;
 };
 
-/// Model runs in slots: writes the input, starts the batch, and turns what it wrote into a result. Used by the local loop
-/// and by an MPI worker (which has slot 1 alone).
+/// Model runs in slots: writes the input, starts the batch, and turns what it wrote into a result. Used by the local
+/// loop and by an MPI worker (which has slot 1 alone).
 class ModelRunner final {
  public:
-  /// Reads and checks the templates and opens the observed series (all before any folder is made), then has the launcher
-  /// make the slots' folders. Throws FatalError.
+  /// Reads and checks the templates and opens the observed series (all before any folder is made), then has the
+  /// launcher make the slots' folders. Throws FatalError.
   ModelRunner(ModelDescription description, ParameterModel& parameters, ObjectiveAggregator& aggregator,
               ProcessLauncher& launcher, const LauncherSettings& launcherSettings);
 
-  /// Builds the full parameter vector, removes the results of the slot's last run, writes the parameter files and starts
-  /// the batch; or says why the set is not run.
+  /// Builds the full parameter vector, removes the results of the slot's last run, writes the parameter files and
+  /// starts the batch; or says why the set is not run. Throws FatalError when a file cannot be removed or written.
   std::optional<EvaluationFailure> prepareModelRun(std::span<const double> set, int slot);
 
-  /// After the slot's batch has ended: its result, with number 0.
+  /// After the slot's batch has ended: its result, with number 0. What a model run may do wrong makes a failed result;
+  /// throws FatalError for what the measures cannot be computed from at all.
   EvaluationResult collect(int slot);
 
   /// A result with the failed-run value in every field.
@@ -47,14 +48,34 @@ class ModelRunner final {
 
   ObjectiveAggregator& aggregator() { return aggregator_; }
   ProcessLauncher& launcher() { return launcher_; }
+  const std::vector<ParameterTemplate>& templates() const { return templates_; }
 
  private:
+  /// Where one slot's copies of the model's files lie.
+  struct SlotFiles {
+    std::vector<std::string> parameterFiles;   ///< in the order of ModelDescription::parameterFiles
+    std::vector<std::string> simulationFiles;  ///< in the order of SeriesTables::simulationFileNames()
+    std::string measureFile;                   ///< empty when there is none
+  };
+
+  void requireFilesInBaseFolder() const;
+  /// Returns the texts of converted numeric-ID templates, empty for the others: one a parameter file.
+  std::vector<std::string> readTemplates();
+  std::string slotPath(const std::string& baseFile, int slot) const;
+  void updateResistanceNumbers(const std::string& path);
+  std::optional<EvaluationFailure> findBatchFailure(int slot) const;
+  std::optional<EvaluationFailure> findMissingResults(int slot) const;
+  /// Fills in the measure values, unless what the model wrote cannot be used.
+  std::optional<EvaluationFailure> readMeasures(int slot, std::vector<double>& values);
+  EvaluationFailure makeFailure(EvaluationFailure::Kind kind, std::string reason, int slot) const;
+
   ModelDescription description_;
   ParameterModel& parameters_;
   ObjectiveAggregator& aggregator_;
   ProcessLauncher& launcher_;
+  std::vector<ParameterTemplate> templates_;  ///< one a parameter file
   SeriesTables series_;
-  std::vector<ParameterTemplate> templates_;
+  std::vector<SlotFiles> slots_;
 };
 
 }  // namespace mirevo

@@ -1,0 +1,19 @@
+#include "evaluation/failed_run_policy.h"
+
+#include <fmt/format.h>
+
+#include "common/fatal_error.h"
+
+namespace mirevo {
+
+void FailedRunPolicy::countFailure(int number, const EvaluationFailure& failure) {
+  ++failedCount_;
+  if (failedCount_ <= limit_) return;
+  std::string detail = fmt::format(
+      "failed evaluations: {}; at most {} may fail, a tenth of the {} planned\nthe last of them, No. {}: {}",
+      failedCount_, limit_, planned_, number, failure.reason);
+  for (const std::string& line : failure.lastOutput) detail += "\n| " + line;
+  fatalError("Error: Unable to continue. No of failed simulations too high.", detail);
+}
+
+}  // namespace mirevo

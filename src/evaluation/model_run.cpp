@@ -1,0 +1,271 @@
+#include "evaluation/model_run.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <cmath>
+#include <cstring>
+#include <filesystem>
+#include <sys/stat.h>
+#include <unistd.h>
+#include <utility>
+#include <variant>
+
+#include <fmt/format.h>
+
+#include "common/fatal_error.h"
+#include "common/files.h"
+#include "common/text.h"
+#include "measures/measure_file.h"
+#include "measures/measure_statistics.h"
+
+namespace mirevo {
+namespace {
+
+using Kind = EvaluationFailure::Kind;
+
+/// How many of the last lines that a failed batch printed are kept as evidence.
+constexpr int kEvidenceLines = 20;
+constexpr std::string_view kCrossSectionExtension = ".qcsr";
+
+EvaluationFailure::Kind failureKind(BatchFailure::Kind kind) {
+  switch (kind) {
+    case BatchFailure::Kind::signal:
+      return Kind::signal;
+    case BatchFailure::Kind::couldNotStart:
+      return Kind::couldNotStart;
+    default:
+      return Kind::exitCode;
+  }
+}
+
+std::string_view resistanceUpdateText(ResistanceUpdate outcome) {
+  switch (outcome) {
+    case ResistanceUpdate::updated:
+      break;
+    case ResistanceUpdate::functionNotFound:
+      return "Function \"R35UpdateResistanceNumbers\" not found in DLL";
+    case ResistanceUpdate::libraryNotFound:
+      return "DLL \"ProfileTool.dll\" not found";
+    case ResistanceUpdate::writeError:
+      return "Error writing the .qcs cross section file";
+    case ResistanceUpdate::readError:
+      return "Error reading the .qcs cross section file";
+    case ResistanceUpdate::documentCreationFailed:
+      return "Creation of document object failed";
+    case ResistanceUpdate::noReadAccess:
+      return "Read access to the .qcs cross section file not found";
+    case ResistanceUpdate::wrongExtension:
+      return "File extension \".qcsr\" is expected";
+  }
+  return {};
+}
+
+void removeFile(const std::string& path) {
+  if (::unlink(path.c_str()) == 0 || errno == ENOENT || errno == ENOTDIR) return;
+  fatalError("Error: Unable to remove " + path, std::strerror(errno));
+}
+
+bool exists(const std::string& path) {
+  struct stat status {};
+  return ::stat(path.c_str(), &status) == 0;
+}
+
+}  // namespace
+
+ModelRunner::ModelRunner(ModelDescription description, ParameterModel& parameters, ObjectiveAggregator& aggregator,
+                         ProcessLauncher& launcher, const LauncherSettings& launcherSettings)
+    : description_(std::move(description)), parameters_(parameters), aggregator_(aggregator), launcher_(launcher) {
+  requireFilesInBaseFolder();
+  const std::vector<std::string> converted = readTemplates();
+  series_ = SeriesTables::MirevoTSobjectInit(description_.measures);
+  if (!launcher_.initialise(launcherSettings)) {
+    fatalError("Error: Unable to initialise MirevoSimpleLaunch", launcher_.lastError());
+  }
+  for (int slot = 1; slot <= launcherSettings.slotCount; ++slot) {
+    SlotFiles& files = slots_.emplace_back();
+    for (std::size_t i = 0; i < description_.parameterFiles.size(); ++i) {
+      const ParameterFileItem& item = description_.parameterFiles[i];
+      files.parameterFiles.push_back(slotPath(item.paramFileName, slot));
+      if (converted[i].empty()) continue;
+      // The base folder is never written, so the converted template lies in the copies; it is there to be looked at.
+      const std::string name = slotPath(item.templateFileName, slot) + description_.fileTag + ".tpl";
+      std::string reason;
+      if (!writeByUnlinkAndCreate(name, converted[i], 0666, reason))
+        fatalError("Error: Unable to open " + name, reason);
+    }
+    for (const std::string& name : series_.simulationFileNames()) files.simulationFiles.push_back(slotPath(name, slot));
+    if (!description_.measureFile.empty()) files.measureFile = slotPath(description_.measureFile, slot);
+  }
+}
+
+void ModelRunner::requireFilesInBaseFolder() const {
+  std::vector<std::string> names;
+  for (const ParameterFileItem& item : description_.parameterFiles) {
+    names.push_back(item.paramFileName);
+    names.push_back(item.templateFileName);
+  }
+  for (const OutputMeasure& measure : description_.measures) {
+    if (measure.interfaceType == InterfaceType::timeSeries) names.push_back(measure.simulation.fileName);
+  }
+  if (!description_.measureFile.empty()) names.push_back(description_.measureFile);
+  for (const std::string& name : names) {
+    if (name.starts_with(description_.baseFolder + "/")) continue;
+    fatalError(
+        fmt::format("Error: The file {} does not lie in the model's folder", trimTrailing(name)),
+        fmt::format("expected a file in {} or below it, the folder of the first batch file, which every slot has "
+                    "a copy of",
+                    description_.baseFolder));
+  }
+}
+
+std::vector<std::string> ModelRunner::readTemplates() {
+  std::vector<std::string> converted;
+  const std::vector<ModelParameter>& parameters = parameters_.parameters();
+  for (const ParameterFileItem& item : description_.parameterFiles) {
+    const std::string name(trimTrailing(item.templateFileName));
+    const bool isNumericId = item.fileType == kNumericIdTemplate;
+    std::string reason;
+    const auto text = readTextFile(name, reason);
+    if (!text)
+      fatalError((isNumericId ? "Error: Unable to open " : "Error: Unable to open template file ") + name, reason);
+    converted.push_back(isNumericId ? ConvertIdTemplate(name, *text, parameters) : std::string());
+    templates_.emplace_back(name, isNumericId ? converted.back() : *text, parameters);
+  }
+  return converted;
+}
+
+std::string ModelRunner::slotPath(const std::string& baseFile, int slot) const {
+  return launcher_.getProcessFolder(slot) + std::string(trimTrailing(baseFile).substr(description_.baseFolder.size()));
+}
+
+std::optional<EvaluationFailure> ModelRunner::prepareModelRun(std::span<const double> set, int slot) {
+  const auto mapped = parameters_.MapToModelValues(set);
+  if (const auto* failure = std::get_if<ParameterFailure>(&mapped)) {
+    const bool violated = failure->kind == ParameterFailure::Kind::constraintViolated;
+    return EvaluationFailure{violated ? Kind::constraintsViolated : Kind::equationNotFinite, failure->detail, {}};
+  }
+  const auto modelValues = std::get<std::span<const double>>(mapped);
+  const SlotFiles& files = slots_.at(static_cast<std::size_t>(slot - 1));
+  // What a run did not write must never be taken for its result.
+  for (const std::string& path : files.simulationFiles) removeFile(path);
+  if (!files.measureFile.empty()) removeFile(files.measureFile);
+  for (std::size_t i = 0; i < templates_.size(); ++i) {
+    const std::string& path = files.parameterFiles[i];
+    WriteParameterFile(path, templates_[i], modelValues);
+    if (equalIgnoringCase(std::filesystem::path(path).extension().string(), kCrossSectionExtension)) {
+      updateResistanceNumbers(path);
+    }
+  }
+  launcher_.createProcesses(slot);
+  return std::nullopt;
+}
+
+void ModelRunner::updateResistanceNumbers(const std::string& path) {
+  const ResistanceUpdate outcome = launcher_.r35UpdateResistanceNumbers(path);
+  if (outcome == ResistanceUpdate::updated) return;
+  fatalError(fmt::format("Error updating resistance numbers: {}", resistanceUpdateText(outcome)), path);
+}
+
+EvaluationResult ModelRunner::collect(int slot) {
+  EvaluationResult result;
+  result.measureValues.assign(description_.measures.size(), std::nan(""));
+  auto failure = findBatchFailure(slot);
+  if (!failure) failure = findMissingResults(slot);
+  if (!failure) failure = readMeasures(slot, result.measureValues);
+  if (failure) return failedResult(std::move(*failure));
+
+  const auto isFinite = [](double value) { return std::isfinite(value); };
+  const auto measure = std::find_if_not(result.measureValues.begin(), result.measureValues.end(), isFinite);
+  if (measure != result.measureValues.end()) {
+    const auto i = static_cast<std::size_t>(measure - result.measureValues.begin());
+    return failedResult(makeFailure(
+        Kind::resultNotFinite,
+        fmt::format("output measure \"{}\" is {}", trimTrailing(description_.measures[i].name), formatReal(*measure)),
+        slot));
+  }
+  result.objectiveValues = objectiveFunctionValues(description_.objectives, result.measureValues);
+  const auto objective = std::find_if_not(result.objectiveValues.begin(), result.objectiveValues.end(), isFinite);
+  if (objective != result.objectiveValues.end()) {
+    const auto i = static_cast<std::size_t>(objective - result.objectiveValues.begin());
+    return failedResult(makeFailure(Kind::resultNotFinite,
+                                    fmt::format("objective function \"{}\" is {}",
+                                                trimTrailing(description_.objectives[i].name), formatReal(*objective)),
+                                    slot));
+  }
+  result.aggregate = aggregator_.aggregate(result.objectiveValues);
+  return result;
+}
+
+EvaluationResult ModelRunner::failedResult(EvaluationFailure failure) const {
+  EvaluationResult result;
+  result.measureValues.assign(description_.measures.size(), kFailedRunValue);
+  result.objectiveValues.assign(description_.objectives.size(), kFailedRunValue);
+  result.failure = std::move(failure);
+  return result;
+}
+
+EvaluationFailure ModelRunner::makeFailure(Kind kind, std::string reason, int slot) const {
+  return {kind, std::move(reason), launcher_.lastOutput(slot, kEvidenceLines)};
+}
+
+std::optional<EvaluationFailure> ModelRunner::findBatchFailure(int slot) const {
+  BatchFailure failure = launcher_.failure(slot);
+  if (failure.kind == BatchFailure::Kind::none) return std::nullopt;
+  return makeFailure(failureKind(failure.kind), std::move(failure.detail), slot);
+}
+
+std::optional<EvaluationFailure> ModelRunner::findMissingResults(int slot) const {
+  const SlotFiles& files = slots_.at(static_cast<std::size_t>(slot - 1));
+  std::vector<std::string> wanted = files.simulationFiles;
+  if (!files.measureFile.empty()) wanted.push_back(files.measureFile);
+  for (const std::string& path : wanted) {
+    if (!exists(path)) {
+      return makeFailure(Kind::resultsNotWritten, "the batch ended well but did not write " + path, slot);
+    }
+  }
+  return std::nullopt;
+}
+
+std::optional<EvaluationFailure> ModelRunner::readMeasures(int slot, std::vector<double>& values) {
+  const SlotFiles& files = slots_.at(static_cast<std::size_t>(slot - 1));
+  std::vector<double> written;
+  if (!files.measureFile.empty()) {
+    std::string reason;
+    auto numbers = readMeasureFile(files.measureFile, reason);
+    if (!numbers) return makeFailure(Kind::resultsNotReadable, std::move(reason), slot);
+    written = std::move(*numbers);
+  }
+  if (auto unusable = series_.tryOpenSimulationFiles(files.simulationFiles)) {
+    return makeFailure(Kind::resultsNotReadable, std::move(*unusable), slot);
+  }
+  for (std::size_t i = 0; i < values.size(); ++i) {
+    const OutputMeasure& measure = description_.measures[i];
+    if (measure.interfaceType == InterfaceType::measureFile) {
+      const auto number = static_cast<std::size_t>(measure.measurementNo);
+      if (number <= written.size()) {
+        values[i] = written[number - 1];
+        continue;
+      }
+      return makeFailure(
+          Kind::resultsNotReadable,
+          fmt::format("{}: expected at least {} numbers, found {}", files.measureFile, number, written.size()), slot);
+    }
+    TimeSeriesObject& simulation = series_.simulation(i);
+    if (measure.simulation.itemNo > simulation.itemCount()) {
+      return makeFailure(
+          Kind::resultsNotReadable,
+          fmt::format("{}: expected item No. {}, found {} items", slotPath(measure.simulation.fileName, slot),
+                      measure.simulation.itemNo, simulation.itemCount()),
+          slot);
+    }
+    try {
+      values[i] = measureValue(measure, description_.period, simulation, series_.observation(i));
+    } catch (const FatalError& error) {  // it names the file as the setup does
+      fatalError(error.message(), error.detail() + "\nread from " + slotPath(measure.simulation.fileName, slot));
+    }
+  }
+  series_.releaseSimulationFiles();
+  return std::nullopt;
+}
+
+}  // namespace mirevo
