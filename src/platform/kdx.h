@@ -1,7 +1,9 @@
 #pragma once
 
 #include <cstdint>
+#include <functional>
 #include <memory>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <unordered_map>
@@ -35,6 +37,9 @@ struct KdxKeyword {
 /// tens of thousands of sections is read in linear time.
 class KdxSection final {
  public:
+  /// Deeper nesting is refused as a syntax error, so that no walk over the tree can run out of stack.
+  static constexpr std::size_t kMaximumDepth = 100;
+
   KdxSection(std::string name, KdxPosition position);
 
   const std::string& name() const { return name_; }
@@ -53,12 +58,20 @@ class KdxSection final {
   KdxSection& addSection(std::string name, KdxPosition position);
 
  private:
+  /// Lets a look-up go without a copy of the name.
+  struct NameHash {
+    using is_transparent = void;
+    std::size_t operator()(std::string_view name) const { return std::hash<std::string_view>{}(name); }
+  };
+  /// Places of a name in file order.
+  using NameIndex = std::unordered_map<std::string, std::vector<std::size_t>, NameHash, std::equal_to<>>;
+
   std::string name_;
   KdxPosition position_;
   std::vector<KdxKeyword> keywords_;
   std::vector<std::unique_ptr<KdxSection>> sections_;
-  std::unordered_map<std::string, std::vector<std::size_t>> keywordIndex_;
-  std::unordered_map<std::string, std::vector<std::size_t>> sectionIndex_;
+  NameIndex keywordIndex_;
+  NameIndex sectionIndex_;
 };
 
 /// Why a KDX text cannot be read: the first place where it breaks, and what was expected there.
@@ -73,7 +86,17 @@ struct KdxDocument {
   KdxSection root{"", {}};
 };
 
-/// Parses a KDX text. `sourceName` is kept for messages only.
+/// Parses a KDX text in time linear in its length. `sourceName` is kept for messages only.
 std::variant<KdxDocument, KdxSyntaxError> parseKdx(std::string sourceName, std::string_view text);
+
+/// `2001-01-31`, with ` 12:30` or `T12:30` behind it, and `:15` behind that; nothing when any of `text` has another
+/// form. The fields are taken apart and not judged: month 13 is a date here.
+std::optional<DateRecord> parseKdxDate(std::string_view text);
+
+/// "2001-01-31 12:30", with the seconds where they are not 0.
+std::string formatKdxDate(const DateRecord& date);
+
+/// `text` between double quotes for a message: cut to a readable length, control characters replaced.
+std::string quotedForMessage(std::string_view text);
 
 }  // namespace mirevo
