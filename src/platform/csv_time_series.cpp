@@ -3,7 +3,6 @@
 #include <algorithm>
 #include <charconv>
 #include <cmath>
-#include <filesystem>
 #include <utility>
 
 #include "common/calendar.h"
@@ -42,12 +41,9 @@ std::optional<char> findSeparator(std::string_view header) {
 }  // namespace
 
 bool CsvTimeSeries::open(const std::string& fileName) {
-  std::error_code ignored;
-  const auto type = std::filesystem::status(fileName, ignored).type();
-  if (type != std::filesystem::file_type::regular && type != std::filesystem::file_type::not_found &&
-      type != std::filesystem::file_type::directory && type != std::filesystem::file_type::none) {
+  if (isSpecialFile(fileName)) {
     clear();
-    lastError_ = fileName + ": not a regular file";  // a pipe or device would be waited for, or never end
+    lastError_ = fileName + ": not a regular file";
     return false;
   }
   std::string reason;
