@@ -102,7 +102,10 @@ bool CsvTimeSeries::readMissingMark(std::string_view line) {
   if (text.empty() || text.front() != '=') return true;  // a comment about missing things
   text = trim(text.substr(1));
   const std::optional<float> value = csv::parseCell(text.data(), text.data() + text.size());
-  if (!value || text.empty()) return fail(text.data(), "a number after \"# missing =\"", quoteFound(text));
+  if (!value || text.empty()) {
+    const char* const at = text.empty() ? line.data() + line.size() : text.data();
+    return fail(at, "a number after \"# missing =\"", quoteFound(text));
+  }
   deleteValue_ = *value;
   return true;
 }
