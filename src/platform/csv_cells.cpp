@@ -97,7 +97,8 @@ std::optional<std::int64_t> DateScanner::scanCell(const char*& at, const char* e
 
 std::optional<float> parseCell(const char* begin, const char* end) {
   const std::string_view text = cellText(begin, end);
-  if (text.empty() || text == "NA" || equalIgnoringCase(text, "nan")) {
+  // "-nan" is how the C library prints a NaN whose sign bit is set.
+  if (text.empty() || text == "NA" || equalIgnoringCase(text, "nan") || equalIgnoringCase(text, "-nan")) {
     return std::numeric_limits<float>::quiet_NaN();
   }
   const std::optional<double> number = parseReal(text);

@@ -3,7 +3,6 @@
 #include <algorithm>
 #include <charconv>
 #include <cmath>
-#include <filesystem>
 #include <utility>
 
 #include "common/calendar.h"
@@ -42,12 +41,9 @@ std::optional<char> findSeparator(std::string_view header) {
 }  // namespace
 
 bool CsvTimeSeries::open(const std::string& fileName) {
-  std::error_code ignored;
-  const auto type = std::filesystem::status(fileName, ignored).type();
-  if (type != std::filesystem::file_type::regular && type != std::filesystem::file_type::not_found &&
-      type != std::filesystem::file_type::directory && type != std::filesystem::file_type::none) {
+  if (isSpecialFile(fileName)) {
     clear();
-    lastError_ = fileName + ": not a regular file";  // a pipe or device would be waited for, or never end
+    lastError_ = fileName + ": not a regular file";
     return false;
   }
   std::string reason;
@@ -106,7 +102,10 @@ bool CsvTimeSeries::readMissingMark(std::string_view line) {
   if (text.empty() || text.front() != '=') return true;  // a comment about missing things
   text = trim(text.substr(1));
   const std::optional<float> value = csv::parseCell(text.data(), text.data() + text.size());
-  if (!value || text.empty()) return fail(text.data(), "a number after \"# missing =\"", quoteFound(text));
+  if (!value || text.empty()) {
+    const char* const at = text.empty() ? line.data() + line.size() : text.data();
+    return fail(at, "a number after \"# missing =\"", quoteFound(text));
+  }
   deleteValue_ = *value;
   return true;
 }

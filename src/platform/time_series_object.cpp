@@ -2,9 +2,11 @@
 
 #include <algorithm>
 #include <filesystem>
+#include <system_error>
 
 #include "common/text.h"
 #include "platform/csv_time_series.h"
+#include "platform/netcdf_time_series.h"
 
 namespace mirevo {
 namespace {
@@ -51,9 +53,16 @@ std::optional<float> extractValue(const TimeSeriesObject& series, int item, doub
 
 }  // namespace
 
+bool isSpecialFile(const std::string& fileName) {
+  std::error_code ignored;  // the reader itself says why a file cannot be read
+  const std::filesystem::file_status status = std::filesystem::status(fileName, ignored);
+  return std::filesystem::is_other(status);
+}
+
 std::unique_ptr<TimeSeriesObject> createTimeSeriesObject(const std::string& fileName, std::string& reason) {
   const std::string ending = toLowerAscii(std::filesystem::path(trimTrailing(fileName)).extension().string());
   if (ending == ".csv" || ending == ".txt" || ending == ".tsv") return std::make_unique<CsvTimeSeries>();
+  if (ending == ".nc") return std::make_unique<NetcdfTimeSeries>();
   reason = "expected a time-series file name ending in .csv, .txt, .tsv or .nc, found " +
            (ending.empty() ? std::string("no ending") : "\"" + ending + "\"");
   return nullptr;

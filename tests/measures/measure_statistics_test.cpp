@@ -204,6 +204,20 @@ TEST(MeasureStatistics, FailuresHaveTheirFixedTextsAndSayMore) {
   }
 }
 
+TEST(MeasureStatistics, APeriodWithoutASimulatedStepHasNoPeak) {
+  // A simulated value is found between the steps at day 0 and day 10, but no step lies within days 4 to 6.
+  MemoryTimeSeries simulation({2001, 1, 1}, {0.0, 10.0}, {{1.0F, 2.0F}});
+  MemoryTimeSeries observation = daily({1, 1, 1, 1, 1, 1, 1, 1});
+  const EvaluationPeriod period{{2001, 1, 5}, {2001, 1, 7}};
+  EXPECT_NO_THROW(measureValue(measure(), period, simulation, observation));
+  try {
+    measureValue(measure(StatisticType::lowDifference), period, simulation, observation);
+    ADD_FAILURE() << "accepted";
+  } catch (const FatalError& error) {
+    EXPECT_EQ(error.message(), "Error extracting max value of TS item in /base/sim.csv");
+  }
+}
+
 TEST(MeasureStatistics, ATextColumnIsRefusedWithItsPlace) {
   CsvTimeSeries simulation;
   ASSERT_TRUE(simulation.parse("sim.csv", "time,Q\n2001-01-01,A:e\n"));

@@ -34,7 +34,7 @@ TEST(CsvTimeSeries, ReadsEveryFormOfFile) {
   const Case cases[] = {
       {"comma", "time,Q\n2000-02-28,1.5\n2000-02-28 12:00,\n2000-02-28 24:00,-2e2\n2000-03-01 00:00:00,.25\n"},
       {"semicolon, CRLF, no last line end",
-       "time;Q\r\n2000-02-28;1.5\r\n2000-02-28T12:00;NaN\r\n2000-02-29;-200\r\n2000-03-01;0.25"},
+       "time;Q\r\n2000-02-28;1.5\r\n2000-02-28T12:00;-nan\r\n2000-02-29;-200\r\n2000-03-01;0.25"},
       {"tab, missing mark, comments, byte-order mark",
        "\xEF\xBB\xBF# gauge 4\n\n#missing=-9.99\n# missing values are marked\n"
        "time\tQ\n2000-02-28\t1.5\n2000-02-28 12:00\t-9.990\n2000-02-29\t-200\n2000-03-01\t0.25\n\n \n"},
@@ -71,6 +71,7 @@ TEST(CsvTimeSeries, RefusesWithThePlaceAndWhatWasExpected) {
        "s.csv:1:1: expected a header row with its columns separated by comma, semicolon or tab, found "
        "\"time Q\""},
       {"2001-01-31,1\n", "s.csv:1:1: expected a header row before the first time step, found \"2001-01-31,1\""},
+      {"# missing = \ntime,Q\n", "s.csv:1:12: expected a number after \"# missing =\", found \"\""},
       {"# missing = none\ntime,Q\n", "s.csv:1:13: expected a number after \"# missing =\", found \"none\""},
       {head + "2001-01-31,1,2\n", "s.csv:4:1: expected a time later than 2001-01-31 00:00, found 2001-01-31 00:00"},
       {head + "2001-01-30 23:59:59,1,2\n",

@@ -1,0 +1,109 @@
+// Reading a simulated series of ten hourly years (87,600 rows) from a CSV file, as it is done after every model run:
+// the program's reader beside a plain loop of fgets, sscanf and strtod.
+
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <filesystem>
+#include <fstream>
+#include <string>
+#include <unistd.h>
+#include <vector>
+
+#include <benchmark/benchmark.h>
+#include <fmt/format.h>
+
+#include "common/calendar.h"
+#include "platform/csv_time_series.h"
+
+namespace {
+
+constexpr int kRows = 87600;
+
+/// A file of hourly rows with `items` items, removed at the end of the program.
+class SampleFile final {
+ public:
+  explicit SampleFile(int items)
+      : path_(fmt::format("{}/csv_bench_{}_{}.csv", std::filesystem::temp_directory_path().string(), getpid(), items)) {
+    std::ofstream out(path_);
+    out << "time";
+    for (int item = 1; item <= items; ++item) out << ",Q" << item;
+    out << '\n';
+    const std::int64_t start = mirevo::secondNumber({1991, 1, 1});
+    for (int row = 0; row < kRows; ++row) {
+      out << mirevo::formatDate(mirevo::dateOfSecond(start + row * std::int64_t{3600}));
+      for (int item = 1; item <= items; ++item) out << fmt::format(",{:.4f}", (row * 37 % 100003) * 0.013 + item);
+      out << '\n';
+    }
+  }
+  ~SampleFile() { std::remove(path_.c_str()); }
+  SampleFile(const SampleFile&) = delete;
+  SampleFile& operator=(const SampleFile&) = delete;
+  const std::string& path() const { return path_; }
+
+ private:
+  std::string path_;
+};
+
+const SampleFile& sampleFile(int items) {
+  static const SampleFile one(1);
+  static const SampleFile ten(10);
+  return items == 1 ? one : ten;
+}
+
+/// Opens the file and reads its last item.
+void BM_CsvTimeSeries(benchmark::State& state) {
+  const int item = static_cast<int>(state.range(0));
+  const std::string& path = sampleFile(item).path();
+  for (auto _ : state) {
+    mirevo::CsvTimeSeries series;
+    if (!series.open(path) || !series.getData(item)) state.SkipWithError(series.lastError().c_str());
+    benchmark::DoNotOptimize(series.values(item).data());
+    if (series.timeStepCount() != kRows) state.SkipWithError("rows are missing");
+  }
+  state.SetItemsProcessed(state.iterations() * kRows);
+}
+
+/// The plain way: line by line, sscanf for the time, strtod for the value. It checks nothing but the order of times.
+void BM_PlainLoop(benchmark::State& state) {
+  const int item = static_cast<int>(state.range(0));
+  const std::string& path = sampleFile(item).path();
+  for (auto _ : state) {
+    std::vector<double> times;
+    std::vector<float> values;
+    std::FILE* file = std::fopen(path.c_str(), "r");
+    char line[4096];
+    if (std::fgets(line, sizeof line, file) == nullptr) state.SkipWithError("no header");
+    while (std::fgets(line, sizeof line, file) != nullptr) {
+      const char* cell = line;
+      int field[5] = {};
+      if (std::sscanf(line, "%d-%d-%d %d:%d", &field[0], &field[1], &field[2], &field[3], &field[4]) != 5) break;
+      const auto days = static_cast<double>(mirevo::dayNumber(field[0], field[1], field[2]));
+      times.push_back(days + field[3] / 24.0 + field[4] / 1440.0);
+      for (int i = 0; i < item && cell != nullptr; ++i) cell = std::strchr(cell + 1, ',');
+      if (cell == nullptr) break;
+      values.push_back(static_cast<float>(std::strtod(cell + 1, nullptr)));
+    }
+    std::fclose(file);
+    if (times.size() != kRows || values.size() != kRows) state.SkipWithError("rows are missing");
+    benchmark::DoNotOptimize(values.data());
+  }
+  state.SetItemsProcessed(state.iterations() * kRows);
+}
+
+/// The floor: the file's bytes alone.
+void BM_ReadBytes(benchmark::State& state) {
+  const std::string& path = sampleFile(static_cast<int>(state.range(0))).path();
+  for (auto _ : state) {
+    std::ifstream in(path, std::ios::binary);
+    std::string content(std::filesystem::file_size(path), '\0');
+    in.read(content.data(), static_cast<std::streamsize>(content.size()));
+    benchmark::DoNotOptimize(content.data());
+  }
+}
+
+BENCHMARK(BM_CsvTimeSeries)->Arg(1)->Arg(10)->Unit(benchmark::kMillisecond);
+BENCHMARK(BM_PlainLoop)->Arg(1)->Arg(10)->Unit(benchmark::kMillisecond);
+BENCHMARK(BM_ReadBytes)->Arg(1)->Arg(10)->Unit(benchmark::kMillisecond);
+
+}  // namespace
