@@ -106,7 +106,7 @@ std::string ParameterTemplate::fill(std::span<const double> modelValues) const {
     assert(placeholders_[i].parameter < modelValues.size());
     content += FormatValueForPlaceholder(modelValues[placeholders_[i].parameter], placeholders_[i].width);
     // A wide placeholder at the end of a line keeps blanks behind its value; lines end without them.
-    if (pieces_[i + 1].front() == '\n') trimBlanksAtEnd(content);
+    if (pieces_[i + 1].starts_with('\n')) trimBlanksAtEnd(content);
     content += pieces_[i + 1];
   }
   return content;

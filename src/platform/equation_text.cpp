@@ -22,6 +22,9 @@ bool isNamePart(char c) {
   return isNameStart(c) || isDigit(c) || c == '.';
 }
 
+/// Longest text that the parser library takes.
+constexpr std::size_t kMaximumTranslation = 5000;
+
 /// Walks over an equation once, keeping what is open and whether an operand or an operator must follow.
 class Translator final {
  public:
@@ -66,10 +69,7 @@ class Translator final {
   void skipBlanks() {
     while (!atEnd() && (here() == ' ' || here() == '\t')) ++at_;
   }
-  void emit(std::string_view text) {
-    result_.text += text;
-    result_.text += ' ';
-  }
+  void emit(std::string_view text) { result_.text += text; }
 
   /// What stands here, for a message.
   std::string found() const {
@@ -108,9 +108,9 @@ class Translator final {
   }
 
   void emitSigns() {
-    if (minus_) result_.text += '-';
+    if (minus_ || negations_ > 0) emit(" ");  // a sign must not run together with the operator before it
+    if (minus_) emit("-");
     result_.text.append(static_cast<std::size_t>(negations_), '!');
-    result_.text += ' ';
     minus_ = false;
     negations_ = 0;
   }
@@ -221,7 +221,7 @@ class Translator final {
       fail(at_, fmt::format("brackets are nested more than {} deep", kMaximumEquationNesting));
     }
     emitSigns();
-    if (function != nullptr) result_.text += function->name;  // the library wants the bracket right behind it
+    if (function != nullptr) emit(function->name);
     emit("(");
     open_.push_back({at_, function, 1, {}});
     ++at_;
@@ -306,6 +306,9 @@ class Translator final {
     }
     refuseOpenCondition();
     if (open_.size() > 1) fail(open_.back().position, "\"(\" has no \")\" after it");
+    if (result_.text.size() > kMaximumTranslation) {
+      fail(0, "the equation has too many terms", "divide it between several dependent parameters");
+    }
   }
 
   std::string_view equation_;
