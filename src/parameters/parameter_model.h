@@ -1,7 +1,7 @@
 #pragma once
 
+#include <cstdint>
 #include <memory>
-#include <optional>
 #include <span>
 #include <string>
 #include <variant>
@@ -18,11 +18,16 @@ struct ParameterFailure {
   std::string detail;  ///< one line: which constraint or equation, with the values of its sides
 };
 
+/// Whether a constraint is violated by the values of its two equations (codes of InternalConstraint). A code outside
+/// 0..3 never reports a violation.
+bool CheckConstraint(double left, double right, std::int32_t logicalOperator);
+
 /// All parameters of the model: the search space, the order of evaluation, the compiled equations and constraints.
 class ParameterModel final {
  public:
-  /// Builds the search space, refuses illegal relationships, orders the dependent parameters and compiles every
-  /// equation once. Throws FatalError with the fixed texts.
+  /// Builds the search space, compiles every equation once, refuses illegal relationships, orders the dependent
+  /// parameters and compiles the constraints, in this order. Throws FatalError with the fixed texts; the detail names
+  /// the parameter or constraint. Of a dependent parameter neither initial value, bounds nor transformation are used.
   ParameterModel(std::vector<ModelParameter> parameters, std::vector<InternalConstraint> constraints);
   ~ParameterModel();
   ParameterModel(const ParameterModel&) = delete;
@@ -35,7 +40,7 @@ class ParameterModel final {
 
   /// The full parameter vector of a model run (model scale, one value per parameter in setup order), or why the set
   /// cannot be run: an equation without a finite value, or a violated constraint. The vector stays valid until the next
-  /// call.
+  /// call. `set` has one value a variable parameter, on the search scale.
   std::variant<std::span<const double>, ParameterFailure> MapToModelValues(std::span<const double> set);
 
  private:

@@ -10,7 +10,9 @@
 
 namespace mirevo {
 
-inline constexpr std::int32_t kNumericIdTemplate = 1;  ///< `FileType`; any other value is a delimiter template
+inline constexpr std::int32_t kNumericIdTemplate = 1;     ///< `FileType`; any other value is a delimiter template
+inline constexpr char kConvertedDelimiter = '!';          ///< of a converted numeric-ID template
+inline constexpr std::size_t kMaximumLineLength = 50000;  ///< of a template line, in bytes
 
 /// One model parameter file of the setup. File names are absolute, in or below the base folder.
 struct ParameterFileItem {
@@ -20,24 +22,28 @@ struct ParameterFileItem {
 };
 
 /// The delimiter template that a numeric-ID template stands for, as text with its delimiter line. `templateName` is
-/// used in messages. Throws FatalError for an ID value that no parameter has.
+/// used in messages. Throws FatalError for an ID value that no parameter has, for a token that is no number though it
+/// ends like an ID value, and for a line that is too long.
+///
+/// Deliberate: an ID value that begins in column 1 keeps its first character in front of the placeholder.
 std::string ConvertIdTemplate(std::string_view templateName, std::string_view text,
                               std::span<const ModelParameter> parameters);
 
 /// A delimiter template taken apart once, so that writing a parameter file costs one pass over its pieces.
 class ParameterTemplate final {
  public:
-  /// Throws FatalError for a text without a delimiter in its first line and for a placeholder that names no parameter.
+  /// Throws FatalError for a text without a delimiter in its first line, for a placeholder that names no parameter, and
+  /// for a line that is too long. The first parameter of a name counts; trailing blanks of a name do not.
   ParameterTemplate(std::string_view templateName, std::string_view text, std::span<const ModelParameter> parameters);
 
-  /// The parameter file's content for a full parameter vector.
+  /// The parameter file's content for a full parameter vector. Every line ends in LF and has no trailing blanks.
   std::string fill(std::span<const double> modelValues) const;
 
   /// 0-based indices of the parameters that the template names, ascending, each once.
   std::vector<std::size_t> parametersNamed() const;
 
   /// One warning a placeholder in which values between the parameter's bounds keep fewer than four significant digits,
-  /// with the width to use.
+  /// with the width to use; and one a placeholder that a digit touches, so that the model reads one number of both.
   std::vector<std::string> narrowPlaceholderWarnings(std::span<const ModelParameter> parameters) const;
 
  private:
@@ -46,6 +52,8 @@ class ParameterTemplate final {
     int width = 0;              ///< delimiters included
     int line = 0;               ///< in the template, from 1
   };
+  void takeLine(std::string_view line, int lineNumber, char delimiter, std::span<const ModelParameter> parameters);
+
   std::string templateName_;
   std::vector<std::string> pieces_;  ///< text before, between and after the placeholders
   std::vector<Placeholder> placeholders_;

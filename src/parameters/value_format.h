@@ -8,7 +8,8 @@ namespace mirevo {
 inline constexpr int kMaximumValueWidth = 20;
 
 /// The text of a value for a placeholder of `width` characters (delimiters included): right-aligned in its first
-/// min(width, 20) characters. Returns exactly `width` characters.
+/// min(width, 20) characters. Returns exactly `width` characters. Digits that do not fit are cut off, not rounded. A
+/// value whose exponent needs three digits, and one that is no number, becomes "*" followed by blanks.
 std::string FormatValueForPlaceholder(double value, int width);
 
 }  // namespace mirevo

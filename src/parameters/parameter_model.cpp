@@ -1,0 +1,204 @@
+#include "parameters/parameter_model.h"
+
+#include <cassert>
+#include <cmath>
+#include <optional>
+
+#include <fmt/format.h>
+
+#include "common/fatal_error.h"
+#include "common/text.h"
+#include "parameters/dependency_order.h"
+#include "platform/expression_evaluator.h"
+
+namespace mirevo {
+namespace {
+
+constexpr std::string_view kOperatorSymbols[] = {"<", "<=", ">", ">="};
+
+std::vector<std::string> namesOf(std::span<const ModelParameter> parameters) {
+  std::vector<std::string> names;
+  names.reserve(parameters.size());
+  for (const ModelParameter& parameter : parameters) names.emplace_back(trimTrailing(parameter.name));
+  return names;
+}
+
+double valueOf(const CompiledExpression& expression, std::string_view equation) {
+  const std::optional<double> value = expression.evaluate();
+  if (!value) failEvaluation(equation);
+  return *value;
+}
+
+}  // namespace
+
+bool CheckConstraint(double left, double right, std::int32_t logicalOperator) {
+  switch (logicalOperator) {
+    case 0:
+      return left >= right;
+    case 1:
+      return left > right;
+    case 2:
+      return left <= right;
+    case 3:
+      return left < right;
+    default:
+      return false;
+  }
+}
+
+class ParameterModel::Implementation {
+ public:
+  Implementation(std::vector<ModelParameter> parameters, std::vector<InternalConstraint> constraints);
+
+  void assignVariableParameters(std::span<const double> set);
+  void assignFixedParameters();
+  std::optional<ParameterFailure> assignDependentParameters();
+  std::optional<ParameterFailure> checkConstraints() const;
+
+  const std::vector<ModelParameter> parameters_;
+  const SearchSpace space_;
+  std::vector<int> order_;  ///< 1-based
+  std::vector<double> values_;
+
+ private:
+  struct CompiledConstraint {
+    InternalConstraint constraint;
+    std::unique_ptr<CompiledExpression> left;
+    std::unique_ptr<CompiledExpression> right;
+  };
+
+  void compileEquations();
+  void compileConstraints(std::vector<InternalConstraint> constraints);
+
+  const std::vector<std::string> names_;
+  ExpressionEvaluator evaluator_;
+  std::vector<std::unique_ptr<CompiledExpression>> equations_;  ///< one a parameter, null unless dependent
+  std::vector<CompiledConstraint> constraints_;
+};
+
+ParameterModel::Implementation::Implementation(std::vector<ModelParameter> parameters,
+                                               std::vector<InternalConstraint> constraints)
+    : parameters_(std::move(parameters)),
+      space_(BuildSearchSpace(parameters_)),
+      values_(parameters_.size(), 0.0),
+      names_(namesOf(parameters_)),
+      evaluator_(names_, values_) {
+  compileEquations();
+  std::vector<std::vector<std::size_t>> named(parameters_.size());
+  for (std::size_t i = 0; i < named.size(); ++i) {
+    if (equations_[i]) named[i] = equations_[i]->variables();
+  }
+  order_ = OrderDependentParameters(parameters_, named);
+  compileConstraints(std::move(constraints));
+}
+
+void ParameterModel::Implementation::compileEquations() {
+  equations_.resize(parameters_.size());
+  for (std::size_t i = 0; i < parameters_.size(); ++i) {
+    if (parameters_[i].parameterType != ParameterType::dependent) continue;
+    try {
+      equations_[i] = evaluator_.compile(parameters_[i].equation);
+    } catch (const FatalError& error) {
+      fatalError(error.message(),
+                 fmt::format("equation of the dependent parameter \"{}\"\n{}", names_[i], error.detail()));
+    }
+  }
+}
+
+void ParameterModel::Implementation::compileConstraints(std::vector<InternalConstraint> constraints) {
+  for (InternalConstraint& constraint : constraints) {
+    CompiledConstraint compiled;
+    const auto compileSide = [&](std::string_view side, const std::string& equation) {
+      try {
+        return evaluator_.compile(equation);
+      } catch (const FatalError& error) {
+        fatalError("Error: Invalid equation for internal constraints",
+                   fmt::format("{} equation of constraint {}\n{}\n{}", side, constraints_.size() + 1, error.message(),
+                               error.detail()));
+      }
+    };
+    compiled.left = compileSide("left", constraint.leftEquation);
+    compiled.right = compileSide("right", constraint.rightEquation);
+    compiled.constraint = std::move(constraint);
+    constraints_.push_back(std::move(compiled));
+  }
+}
+
+void ParameterModel::Implementation::assignVariableParameters(std::span<const double> set) {
+  std::size_t k = 0;
+  for (const int number : order_) {
+    const auto i = static_cast<std::size_t>(number) - 1;
+    if (parameters_[i].parameterType != ParameterType::variable) continue;
+    bool failed = false;
+    values_[i] = TransformParameterValue(set[k], space_.lower[k], space_.transformation[k],
+                                         TransformDirection::backward, failed);
+    ++k;
+  }
+}
+
+void ParameterModel::Implementation::assignFixedParameters() {
+  for (const int number : order_) {
+    const auto i = static_cast<std::size_t>(number) - 1;
+    if (parameters_[i].parameterType == ParameterType::fixed) values_[i] = parameters_[i].initialValue;
+  }
+}
+
+std::optional<ParameterFailure> ParameterModel::Implementation::assignDependentParameters() {
+  for (const int number : order_) {
+    const auto i = static_cast<std::size_t>(number) - 1;
+    if (!equations_[i]) continue;
+    values_[i] = valueOf(*equations_[i], parameters_[i].equation);
+    if (!std::isfinite(values_[i])) {
+      return ParameterFailure{ParameterFailure::Kind::equationNotFinite,
+                              fmt::format("the equation of parameter \"{}\" gives {}: {}", names_[i],
+                                          formatReal(values_[i]), trim(parameters_[i].equation))};
+    }
+  }
+  return std::nullopt;
+}
+
+std::optional<ParameterFailure> ParameterModel::Implementation::checkConstraints() const {
+  for (std::size_t c = 0; c < constraints_.size(); ++c) {
+    const InternalConstraint& constraint = constraints_[c].constraint;
+    const double left = valueOf(*constraints_[c].left, constraint.leftEquation);
+    const double right = valueOf(*constraints_[c].right, constraint.rightEquation);
+    const bool knownOperator = constraint.logicalOperator >= 0 && constraint.logicalOperator <= 3;
+    // A side that is not a number would satisfy every comparison; such a set is not run. Infinite sides are compared.
+    const bool undefined = knownOperator && (std::isnan(left) || std::isnan(right));
+    if (!undefined && !CheckConstraint(left, right, constraint.logicalOperator)) continue;
+    return ParameterFailure{
+        undefined ? ParameterFailure::Kind::equationNotFinite : ParameterFailure::Kind::constraintViolated,
+        fmt::format("constraint {} ({} {} {}): left side {}, right side {}", c + 1, trim(constraint.leftEquation),
+                    kOperatorSymbols[constraint.logicalOperator], trim(constraint.rightEquation), formatReal(left),
+                    formatReal(right))};
+  }
+  return std::nullopt;
+}
+
+ParameterModel::ParameterModel(std::vector<ModelParameter> parameters, std::vector<InternalConstraint> constraints) {
+  if (parameters.empty()) fatalError("Error: No model parameters defined");
+  implementation_ = std::make_unique<Implementation>(std::move(parameters), std::move(constraints));
+}
+
+ParameterModel::~ParameterModel() = default;
+
+const std::vector<ModelParameter>& ParameterModel::parameters() const {
+  return implementation_->parameters_;
+}
+const SearchSpace& ParameterModel::searchSpace() const {
+  return implementation_->space_;
+}
+const std::vector<int>& ParameterModel::evaluationOrder() const {
+  return implementation_->order_;
+}
+
+std::variant<std::span<const double>, ParameterFailure> ParameterModel::MapToModelValues(std::span<const double> set) {
+  assert(set.size() == searchSpace().size());
+  implementation_->assignVariableParameters(set);
+  implementation_->assignFixedParameters();
+  if (auto failure = implementation_->assignDependentParameters()) return *std::move(failure);
+  if (auto failure = implementation_->checkConstraints()) return *std::move(failure);
+  return std::span<const double>(implementation_->values_);
+}
+
+}  // namespace mirevo

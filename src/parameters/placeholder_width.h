@@ -1,0 +1,14 @@
+#pragma once
+
+#include <string>
+
+#include "parameters/model_parameter.h"
+
+namespace mirevo {
+
+/// What a placeholder of that width does to the values of a parameter, for a warning: "... keeps fewer than four
+/// significant digits of ...". Empty when every value tried (the initial value, the bounds and values of every
+/// magnitude between them) keeps four significant digits or all it has.
+std::string describePrecisionLoss(const ModelParameter& parameter, int width);
+
+}  // namespace mirevo

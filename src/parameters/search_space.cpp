@@ -1,0 +1,90 @@
+#include "parameters/search_space.h"
+
+#include <cassert>
+#include <cmath>
+
+#include <fmt/format.h>
+
+#include "common/fatal_error.h"
+#include "common/text.h"
+
+namespace mirevo {
+namespace {
+
+/// Keeps a value that lies a rounding error below a step of an integer parameter on that step.
+constexpr double kIntegerTolerance = 1.0e-8;
+
+void checkInitialValue(const ModelParameter& parameter) {
+  const char* relation = nullptr;
+  if (parameter.initialValue < parameter.lowerBound) relation = "smaller than lower";
+  if (relation == nullptr && parameter.initialValue > parameter.upperBound) relation = "larger than upper";
+  if (relation == nullptr) return;
+  fatalError(
+      fmt::format("Error: Initial parameter value {} bound for parameter {}", relation, trimTrailing(parameter.name)),
+      fmt::format("initial value {}, bounds {} to {}", formatReal(parameter.initialValue),
+                  formatReal(parameter.lowerBound), formatReal(parameter.upperBound)));
+}
+
+double transformForward(const ModelParameter& parameter, double value, std::string_view which) {
+  bool failed = false;
+  const double transformed = TransformParameterValue(value, parameter.lowerBound, parameter.transformationType,
+                                                     TransformDirection::forward, failed);
+  if (failed) {
+    fatalError(fmt::format("Error: Invalid parameter transformation for parameter {}", trimTrailing(parameter.name)),
+               fmt::format("the {} {} has no logarithm; a logarithmic parameter needs an initial value and bounds "
+                           "greater than 0",
+                           which, formatReal(value)));
+  }
+  return transformed;
+}
+
+}  // namespace
+
+double TransformParameterValue(double value, double lowerBound, TransformationType type, TransformDirection direction,
+                               bool& failed) {
+  failed = false;
+  switch (type) {
+    case TransformationType::none:
+      return value;
+    case TransformationType::logarithmic:
+      if (direction != TransformDirection::forward) return std::exp(value);
+      if (!(value > 0.0)) {
+        failed = true;
+        return 0.0;
+      }
+      return std::log(value);
+    case TransformationType::integer:
+      return lowerBound + std::trunc(value - lowerBound + kIntegerTolerance);
+  }
+  return 0.0;
+}
+
+SearchSpace BuildSearchSpace(std::span<const ModelParameter> parameters) {
+  SearchSpace space;
+  for (const ModelParameter& parameter : parameters) {
+    if (parameter.parameterType != ParameterType::variable) continue;
+    checkInitialValue(parameter);
+    space.names.emplace_back(trimTrailing(parameter.name));
+    space.initial.push_back(transformForward(parameter, parameter.initialValue, "initial value"));
+    space.lower.push_back(transformForward(parameter, parameter.lowerBound, "lower bound"));
+    double upper = transformForward(parameter, parameter.upperBound, "upper bound");
+    if (parameter.transformationType == TransformationType::integer) upper += 1.0;
+    space.upper.push_back(upper);
+    space.transformation.push_back(parameter.transformationType);
+  }
+  if (space.names.empty()) fatalError("Error: No variable model parameters defined");
+  return space;
+}
+
+std::vector<double> ToModelScale(const SearchSpace& space, std::span<const double> set) {
+  assert(set.size() == space.size());
+  std::vector<double> values(space.size());
+  for (std::size_t k = 0; k < values.size(); ++k) {
+    bool failed = false;
+    values[k] =
+        TransformParameterValue(set[k], space.lower[k], space.transformation[k], TransformDirection::backward, failed);
+  }
+  return values;
+}
+
+}  // namespace mirevo

@@ -1,0 +1,160 @@
+#include "parameters/template_file.h"
+
+#include <algorithm>
+#include <cassert>
+#include <cerrno>
+#include <cstring>
+#include <sys/stat.h>
+
+#include <fmt/format.h>
+
+#include "common/fatal_error.h"
+#include "common/files.h"
+#include "common/text.h"
+#include "parameters/placeholder_width.h"
+#include "parameters/template_lines.h"
+#include "parameters/value_format.h"
+
+namespace mirevo {
+namespace {
+
+constexpr std::string_view kByteOrderMark = "\xEF\xBB\xBF";
+
+bool isDigit(char c) {
+  return c >= '0' && c <= '9';
+}
+
+/// The delimiter that the first line of a template holds.
+char readDelimiter(std::string_view templateName, std::string_view line) {
+  if (line.substr(0, kByteOrderMark.size()) == kByteOrderMark) line.remove_prefix(kByteOrderMark.size());
+  line = trim(line);
+  const auto refuse = [templateName](std::string_view reason) {
+    fatalError(fmt::format("Error: Delimiter not defined in template file {}", templateName), reason);
+  };
+  if (line.empty()) refuse("the first line of a template holds the character that opens and closes a placeholder");
+  const char delimiter = line.front();
+  if (isDigit(delimiter) || std::string_view("+-.E").find(delimiter) != std::string_view::npos) {
+    refuse(fmt::format("\"{}\" is a character of numbers and cannot mark placeholders; take ! or $ or #", delimiter));
+  }
+  if (line.size() > 1 && static_cast<unsigned char>(delimiter) >= 0xC2 &&
+      (static_cast<unsigned char>(line[1]) & 0xC0) == 0x80) {
+    refuse("the delimiter must be a single-byte character, such as ! or $ or #");
+  }
+  return delimiter;
+}
+
+/// The first parameter of that name, both without trailing blanks; or the count of parameters.
+std::size_t findParameter(std::string_view name, std::span<const ModelParameter> parameters) {
+  const auto found = std::find_if(parameters.begin(), parameters.end(), [name](const ModelParameter& parameter) {
+    return trimBlanks(parameter.name) == name;
+  });
+  return static_cast<std::size_t>(found - parameters.begin());
+}
+
+[[noreturn]] void failUnknownName(std::string_view templateName, int lineNumber, std::size_t column, bool paired,
+                                  char delimiter, std::string_view name, std::span<const ModelParameter> parameters) {
+  std::string detail = fmt::format("{}:{}:{}: ", templateName, lineNumber, column + 1);
+  if (!paired) {
+    detail += fmt::format("the delimiter {} has no partner in its line", delimiter);
+  } else {
+    detail += fmt::format("no parameter has the name that stands here between two {}", delimiter);
+    std::vector<std::string> names;
+    for (const ModelParameter& parameter : parameters) names.emplace_back(trimTrailing(parameter.name));
+    if (const auto nearest = nearestName(name, names)) detail += fmt::format("\ndid you mean \"{}\"?", *nearest);
+  }
+  // The name stands twice: the text is fixed that way.
+  fatalError(fmt::format("Error: Parameter name {} in template file {} invalid", name, name), detail);
+}
+
+void trimBlanksAtEnd(std::string& text) {
+  text.resize(text.find_last_not_of(' ') + 1);
+}
+
+}  // namespace
+
+ParameterTemplate::ParameterTemplate(std::string_view templateName, std::string_view text,
+                                     std::span<const ModelParameter> parameters)
+    : templateName_(templateName), pieces_(1) {
+  const std::vector<std::string_view> lines = templateLines(templateName, text);
+  const char delimiter = readDelimiter(templateName, lines.empty() ? std::string_view{} : lines.front());
+  for (std::size_t i = 1; i < lines.size(); ++i) takeLine(lines[i], static_cast<int>(i) + 1, delimiter, parameters);
+}
+
+void ParameterTemplate::takeLine(std::string_view line, int lineNumber, char delimiter,
+                                 std::span<const ModelParameter> parameters) {
+  std::size_t copied = 0;
+  for (std::size_t open = line.find(delimiter); open != std::string_view::npos; open = line.find(delimiter, copied)) {
+    const std::size_t close = line.find(delimiter, open + 1);
+    const bool paired = close != std::string_view::npos;
+    const std::string_view name = paired ? trimBlanks(line.substr(open + 1, close - open - 1)) : std::string_view{};
+    const std::size_t parameter = name.empty() ? parameters.size() : findParameter(name, parameters);
+    if (parameter == parameters.size()) {
+      failUnknownName(templateName_, lineNumber, open, paired, delimiter, name, parameters);
+    }
+    pieces_.back() += line.substr(copied, open - copied);
+    placeholders_.push_back({parameter, static_cast<int>(close - open) + 1, lineNumber});
+    pieces_.emplace_back();
+    copied = close + 1;
+  }
+  pieces_.back() += line.substr(copied);
+  pieces_.back() += '\n';
+}
+
+std::string ParameterTemplate::fill(std::span<const double> modelValues) const {
+  std::string content = pieces_.front();
+  for (std::size_t i = 0; i < placeholders_.size(); ++i) {
+    assert(placeholders_[i].parameter < modelValues.size());
+    content += FormatValueForPlaceholder(modelValues[placeholders_[i].parameter], placeholders_[i].width);
+    // A wide placeholder at the end of a line keeps blanks behind its value; lines end without them.
+    if (pieces_[i + 1].starts_with('\n')) trimBlanksAtEnd(content);
+    content += pieces_[i + 1];
+  }
+  return content;
+}
+
+std::vector<std::size_t> ParameterTemplate::parametersNamed() const {
+  std::vector<std::size_t> indices;
+  for (const Placeholder& placeholder : placeholders_) indices.push_back(placeholder.parameter);
+  std::sort(indices.begin(), indices.end());
+  indices.erase(std::unique(indices.begin(), indices.end()), indices.end());
+  return indices;
+}
+
+std::vector<std::string> ParameterTemplate::narrowPlaceholderWarnings(
+    std::span<const ModelParameter> parameters) const {
+  std::vector<std::string> warnings;
+  for (std::size_t i = 0; i < placeholders_.size(); ++i) {
+    const Placeholder& placeholder = placeholders_[i];
+    const ModelParameter& parameter = parameters[placeholder.parameter];
+    const std::string where = fmt::format("{}:{}: the placeholder of parameter \"{}\"", templateName_, placeholder.line,
+                                          trimTrailing(parameter.name));
+    if (const std::string loss = describePrecisionLoss(parameter, placeholder.width); !loss.empty()) {
+      warnings.push_back(where + loss);
+    }
+    const std::string& before = pieces_[i];
+    const std::string& after = pieces_[i + 1];
+    // Two placeholders side by side touch only where the second fills its field, which its own width tells.
+    if ((!before.empty() && isDigit(before.back())) || (!after.empty() && isDigit(after.front()))) {
+      warnings.push_back(
+          where + " is touched by a digit, so that the model may read one number of both: put a blank between them");
+    }
+  }
+  return warnings;
+}
+
+void WriteParameterFile(const std::string& path, const ParameterTemplate& parameterTemplate,
+                        std::span<const double> modelValues) {
+  const std::string trimmed(trimTrailing(path));
+  struct stat status {};
+  std::string reason;
+  if (::stat(trimmed.c_str(), &status) != 0) {
+    reason = std::strerror(errno);
+  } else if (!S_ISREG(status.st_mode)) {
+    reason = "not a regular file";
+  } else if (writeByUnlinkAndCreate(trimmed, parameterTemplate.fill(modelValues), status.st_mode, reason)) {
+    return;
+  }
+  fatalError(fmt::format("Error: Unable to open {}", trimmed), reason);
+}
+
+}  // namespace mirevo

@@ -1,0 +1,28 @@
+#include "parameters/template_lines.h"
+
+#include <fmt/format.h>
+
+#include "common/fatal_error.h"
+#include "common/text.h"
+#include "parameters/template_file.h"
+
+namespace mirevo {
+
+std::string_view trimBlanks(std::string_view text) {
+  const auto last = text.find_last_not_of(' ');
+  return last == std::string_view::npos ? std::string_view{} : text.substr(0, last + 1);
+}
+
+std::vector<std::string_view> templateLines(std::string_view templateName, std::string_view text) {
+  std::vector<std::string_view> lines = splitLines(text);
+  for (std::size_t i = 0; i < lines.size(); ++i) {
+    lines[i] = trimBlanks(lines[i]);
+    if (lines[i].size() > kMaximumLineLength) {
+      fatalError(fmt::format("Error: Line {} of template file {} is too long", i + 1, templateName),
+                 fmt::format("it has {} characters; a line may have {}", lines[i].size(), kMaximumLineLength));
+    }
+  }
+  return lines;
+}
+
+}  // namespace mirevo

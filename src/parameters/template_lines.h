@@ -1,0 +1,14 @@
+#pragma once
+
+#include <string_view>
+#include <vector>
+
+namespace mirevo {
+
+/// The lines of a template, without line ends and trailing blanks. Throws FatalError for a line that is too long.
+std::vector<std::string_view> templateLines(std::string_view templateName, std::string_view text);
+
+/// `text` without trailing blanks; tabs stay, as the model may count columns by them.
+std::string_view trimBlanks(std::string_view text);
+
+}  // namespace mirevo

@@ -1,0 +1,82 @@
+#include "parameters/value_format.h"
+
+#include <algorithm>
+#include <cmath>
+#include <optional>
+
+#include <fmt/format.h>
+
+namespace mirevo {
+namespace {
+
+/// Characters of the exponent part, such as E+05.
+constexpr std::size_t kExponentWidth = 4;
+
+/// In single precision on purpose: the limits between the two forms are 10^(w-1) - 1 as single precision gives it.
+constexpr float kPowersOfTen[kMaximumValueWidth] = {1e0F,  1e1F,  1e2F,  1e3F,  1e4F,  1e5F,  1e6F,
+                                                    1e7F,  1e8F,  1e9F,  1e10F, 1e11F, 1e12F, 1e13F,
+                                                    1e14F, 1e15F, 1e16F, 1e17F, 1e18F, 1e19F};
+
+void trimZeros(std::string& text) {
+  const auto last = text.find_last_not_of('0');
+  text.resize(last == std::string::npos ? 0 : last + 1);
+}
+
+/// The value with as many decimals as 20 characters hold, always with its decimal point, without trailing zeros and
+/// without a trailing point; nothing when the digits before the point do not fit.
+std::optional<std::string> fixedForm(double value, int width) {
+  // The integer part with its sign, before rounding; rounding may add one digit.
+  int integerWidth = (value < 0 ? 1 : 0) + 1;
+  for (double rest = std::abs(value); rest >= 10.0; rest /= 10.0) ++integerWidth;
+  int decimals = std::max(0, kMaximumValueWidth - integerWidth - 1);
+  std::string text = fmt::format("{:#.{}f}", value, decimals);
+  while (static_cast<int>(text.size()) > kMaximumValueWidth && decimals > 0) {
+    text = fmt::format("{:#.{}f}", value, --decimals);
+  }
+  if (text.size() > kMaximumValueWidth || static_cast<int>(text.find('.')) > width) return std::nullopt;
+  trimZeros(text);
+  if (text.back() == '.') text.pop_back();
+  return text;
+}
+
+/// The mantissa with as many decimals as 20 characters hold, cut to what the width leaves beside the exponent part;
+/// nothing when the exponent needs three digits.
+std::optional<std::string> exponentForm(double value, std::size_t width) {
+  const int decimals = kMaximumValueWidth - static_cast<int>(kExponentWidth) - (value < 0 ? 3 : 2);
+  std::string text = fmt::format("{:.{}E}", value, decimals);
+  if (text.size() != static_cast<std::size_t>(kMaximumValueWidth)) return std::nullopt;
+  const std::string exponent = text.substr(text.size() - kExponentWidth);
+  text.resize(text.size() - kExponentWidth);
+  trimZeros(text);
+  text.resize(std::min(text.size(), width > kExponentWidth ? width - kExponentWidth : 0));
+  return text + exponent;
+}
+
+}  // namespace
+
+std::string FormatValueForPlaceholder(double value, int width) {
+  if (width <= 0) return {};
+  std::string field(static_cast<std::size_t>(width), ' ');
+  const int w = std::min(width, kMaximumValueWidth);
+  const double upper = static_cast<double>(kPowersOfTen[w - 1] - 1.0F);
+  const double magnitude = std::abs(value);
+
+  std::optional<std::string> text;
+  if (value == 0.0) {
+    text = "0";
+  } else if (std::isfinite(value)) {
+    // Beside the limits of the two forms: where the single-precision limit lies above the power of ten, or a sign takes
+    // a column, the fixed form would lose a digit before the point and be wrong by a factor of ten.
+    if (magnitude >= 1.0 && magnitude < upper) text = fixedForm(value, w);
+    if (!text) text = exponentForm(value, static_cast<std::size_t>(w));
+  }
+  if (!text) {
+    field[0] = '*';
+    return field;
+  }
+  text->resize(std::min(text->size(), static_cast<std::size_t>(w)));
+  std::copy(text->begin(), text->end(), field.begin() + (w - static_cast<std::ptrdiff_t>(text->size())));
+  return field;
+}
+
+}  // namespace mirevo

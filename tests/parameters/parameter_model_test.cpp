@@ -1,0 +1,191 @@
+#include "parameters/parameter_model.h"
+
+#include <algorithm>
+#include <random>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "common/fatal_error.h"
+#include "parameters/dependency_order.h"
+
+namespace mirevo {
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::HasSubstr;
+
+ModelParameter variable(std::string name, double initial = 1, double lower = 0, double upper = 10) {
+  ModelParameter parameter;
+  parameter.name = std::move(name);
+  parameter.initialValue = initial;
+  parameter.lowerBound = lower;
+  parameter.upperBound = upper;
+  return parameter;
+}
+
+ModelParameter fixed(std::string name, double value) {
+  ModelParameter parameter = variable(std::move(name), value);
+  parameter.parameterType = ParameterType::fixed;
+  return parameter;
+}
+
+ModelParameter dependent(std::string name, std::string equation) {
+  ModelParameter parameter = variable(std::move(name), 99);
+  parameter.parameterType = ParameterType::dependent;
+  parameter.equation = std::move(equation);
+  return parameter;
+}
+
+FatalError refused(const std::vector<ModelParameter>& parameters,
+                   const std::vector<InternalConstraint>& constraints = {}) {
+  try {
+    const ParameterModel model(parameters, constraints);
+  } catch (const FatalError& error) {
+    return error;
+  }
+  ADD_FAILURE() << "not refused";
+  return FatalError("");
+}
+
+/// The order as it is described, one swap and one scan after the other.
+std::vector<int> orderStepByStep(const std::vector<std::vector<std::size_t>>& named) {
+  std::vector<std::size_t> order(named.size());
+  for (std::size_t i = 0; i < order.size(); ++i) order[i] = i;
+  const auto namesLater = [&](std::size_t p) {
+    return std::any_of(order.begin() + static_cast<std::ptrdiff_t>(p) + 1, order.end(), [&](std::size_t other) {
+      const auto& list = named[order[p]];
+      return std::find(list.begin(), list.end(), other) != list.end();
+    });
+  };
+  for (bool moved = true; moved;) {
+    moved = false;
+    for (std::size_t p = 0; p < order.size() && !moved; ++p) {
+      for (; namesLater(p); ++p) {
+        std::swap(order[p], order[p + 1]);
+        moved = true;
+      }
+    }
+  }
+  std::vector<int> result;
+  for (const std::size_t i : order) result.push_back(static_cast<int>(i) + 1);
+  return result;
+}
+
+TEST(ParameterModel, AssignsInThreePasses) {
+  ModelParameter count = variable("n", 3, 1, 5);
+  count.transformationType = TransformationType::integer;
+  ParameterModel model({dependent("late", "early * 2 + F"), count, dependent("early", "n + [x 1]"), fixed("F", 100),
+                        variable("x 1"), dependent("constant", "2 ^ 0.5")},
+                       {});
+  EXPECT_THAT(model.evaluationOrder(), ElementsAre(2, 4, 5, 3, 1, 6));
+  for (const double x : {0.5, 7.25}) {
+    const auto values = std::get<0>(model.MapToModelValues(std::vector<double>{4.9999, x}));
+    EXPECT_THAT(values, ElementsAre((4 + x) * 2 + 100, 4, 4 + x, 100, x, std::sqrt(2.0)));
+  }
+}
+
+TEST(ParameterModel, RefusesIllegalRelationships) {
+  const auto v = variable("v");
+  const char* mutual35 =
+      "Illegal relationship between dependent parameters 3 and 5 in the Model Parameters list. Two dependent "
+      "parameters "
+      "cannot depend mutually on each other !!";
+  const char* self2 =
+      "Illegal relationship between dependent parameters 2 and 2 in the Model Parameters list. Two dependent "
+      "parameters "
+      "cannot depend mutually on each other !!";
+  const FatalError mutual =
+      refused({v, fixed("f", 1), dependent("a", "1 + b"), fixed("g", 1), dependent("b", "a * v")});
+  EXPECT_EQ(mutual.message(), mutual35);
+  EXPECT_THAT(mutual.detail(), HasSubstr("\"a\" and \"b\""));
+  EXPECT_EQ(refused({v, dependent("a", "a + 1")}).message(), self2);
+  const FatalError ring =
+      refused({dependent("q", "a"), dependent("a", "b"), dependent("b", "c"), v, dependent("c", "a + v")});
+  EXPECT_EQ(ring.message(),
+            "Illegal relationship between dependent parameters 2, 3 and 5 in the Model Parameters list. Dependent "
+            "parameters cannot depend on each other in a ring !!");
+  EXPECT_EQ(ring.detail(), "\"a\" names \"b\" names \"c\" names \"a\"");
+}
+
+TEST(ParameterModel, NamesWhatItRefuses) {
+  EXPECT_EQ(refused({}).message(), "Error: No model parameters defined");
+  EXPECT_EQ(refused({dependent("d", "1")}).message(), "Error: No variable model parameters defined");
+
+  const FatalError unknown = refused({variable("Manning"), dependent("d", "2 * Maning")});
+  EXPECT_EQ(unknown.message(), "Error: Unable to create the expression 2 * Maning in equation parser");
+  EXPECT_EQ(unknown.detail(),
+            "equation of the dependent parameter \"d\"\ncolumn 5: no parameter is called \"Maning\"\n    2 * Maning\n"
+            "        ^\ndid you mean \"Manning\"?");
+
+  const FatalError constraint = refused({variable("a")}, {{"a", "1", 0}, {"a", "b +", 0}});
+  EXPECT_EQ(constraint.message(), "Error: Invalid equation for internal constraints");
+  EXPECT_THAT(constraint.detail(),
+              HasSubstr("right equation of constraint 2\nError: Unable to create the expression b + "
+                        "in equation parser\ncolumn 1: no parameter is called \"b\""));
+}
+
+TEST(ParameterModel, OrdersAsStepByStep) {
+  std::mt19937 random(7);
+  for (int round = 0; round < 200; ++round) {
+    // Any acyclic relation: a parameter names some of those that a random permutation puts before it.
+    const std::size_t count = 2 + random() % 12;
+    std::vector<std::size_t> permutation(count);
+    for (std::size_t i = 0; i < count; ++i) permutation[i] = i;
+    std::shuffle(permutation.begin(), permutation.end(), random);
+    std::vector<ModelParameter> parameters(count, variable("v"));
+    std::vector<std::vector<std::size_t>> named(count);
+    for (std::size_t i = 1; i < count; ++i) {
+      for (std::size_t j = 0; j < i; ++j) {
+        if (random() % 3 == 0) named[permutation[i]].push_back(permutation[j]);
+      }
+      std::sort(named[permutation[i]].begin(), named[permutation[i]].end());
+      if (!named[permutation[i]].empty()) parameters[permutation[i]].parameterType = ParameterType::dependent;
+    }
+    EXPECT_EQ(OrderDependentParameters(parameters, named), orderStepByStep(named)) << "round " << round;
+  }
+}
+
+TEST(CheckConstraint, FollowsItsTable) {
+  //                              operator: 0      1      2      3      4      -1
+  const struct {
+    double left, right;
+    bool violated[6];
+  } cases[] = {
+      {1, 2, {false, false, true, true, false, false}},
+      {2, 2, {true, false, true, false, false, false}},
+      {3, 2, {true, true, false, false, false, false}},
+  };
+  for (const auto& c : cases) {
+    for (int i = 0; i < 6; ++i) {
+      EXPECT_EQ(CheckConstraint(c.left, c.right, i == 5 ? -1 : i), c.violated[i]) << c.left << " operator " << i;
+    }
+  }
+}
+
+TEST(ParameterModel, SaysWhyASetIsNotRun) {
+  using Kind = ParameterFailure::Kind;
+  ParameterModel model({variable("a"), variable("b"), dependent("d", "ln(a)")},
+                       {{"a + b", "10", 0}, {"sqrt(b - 1)", "5", 1}, {"1 / (b - 2)", "1e300", 1}, {"a", "a", 7}});
+  const struct {
+    double a, b;
+    Kind kind;
+    const char* detail;
+  } cases[] = {
+      {4, 6, Kind::constraintViolated, "constraint 1 (a + b < 10): left side 10, right side 10"},
+      {-1, 3, Kind::equationNotFinite, "the equation of parameter \"d\" gives NaN: ln(a)"},
+      {0, 3, Kind::equationNotFinite, "the equation of parameter \"d\" gives -Inf: ln(a)"},
+      {1, 0.5, Kind::equationNotFinite, "constraint 2 (sqrt(b - 1) <= 5): left side NaN, right side 5"},
+      {1, 2, Kind::constraintViolated, "constraint 3 (1 / (b - 2) <= 1e300): left side Inf, right side 1e+300"},
+  };
+  for (const auto& c : cases) {
+    const auto result = model.MapToModelValues(std::vector<double>{c.a, c.b});
+    ASSERT_EQ(result.index(), 1) << c.detail;
+    EXPECT_EQ(std::get<1>(result).kind, c.kind) << c.detail;
+    EXPECT_EQ(std::get<1>(result).detail, c.detail);
+  }
+  EXPECT_EQ(model.MapToModelValues(std::vector<double>{1, 3}).index(), 0);
+}
+
+}  // namespace
+}  // namespace mirevo

@@ -1,0 +1,106 @@
+#include "parameters/search_space.h"
+
+#include <cmath>
+#include <limits>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "common/fatal_error.h"
+
+namespace mirevo {
+namespace {
+
+ModelParameter parameter(std::string name, double initial, double lower, double upper,
+                         TransformationType transformation = TransformationType::none,
+                         ParameterType type = ParameterType::variable) {
+  ModelParameter result;
+  result.name = std::move(name);
+  result.initialValue = initial;
+  result.lowerBound = lower;
+  result.upperBound = upper;
+  result.transformationType = transformation;
+  result.parameterType = type;
+  return result;
+}
+
+TEST(TransformParameterValue, FollowsItsTable) {
+  constexpr auto kForward = TransformDirection::forward;
+  constexpr auto kBackward = TransformDirection::backward;
+  constexpr auto kInteger = TransformationType::integer;
+  constexpr auto kLog = TransformationType::logarithmic;
+  const struct {
+    double value, lower;
+    TransformationType type;
+    TransformDirection direction;
+    double expected;
+    bool failed;
+  } cases[] = {
+      {0.1, 7, TransformationType::none, kForward, 0.1, false},
+      {-5e-324, 7, TransformationType::none, kBackward, -5e-324, false},
+      {5.9999, 1, kInteger, kBackward, 5, false},
+      {2.999999995, 1, kInteger, kBackward, 3, false},
+      {2.99999998, 1, kInteger, kBackward, 2, false},
+      {3.7, 1, kInteger, kForward, 3, false},
+      {3.7, 0.5, kInteger, kForward, 3.5, false},
+      {-2.5, -4, kInteger, kForward, -3, false},
+      {0.2, 1, kInteger, kForward, 1, false},  // below the bound: truncated towards it
+      {std::exp(1.0), 1, kLog, kForward, 1, false},
+      {0, 1, kLog, kForward, 0, true},
+      {-1, 1, kLog, kForward, 0, true},
+      {std::numeric_limits<double>::quiet_NaN(), 1, kLog, kForward, 0, true},
+      {-1, 1, kLog, kBackward, std::exp(-1.0), false},
+      {5, 1, static_cast<TransformationType>(3), kForward, 0, false},
+  };
+  for (const auto& c : cases) {
+    bool failed = !c.failed;
+    EXPECT_EQ(TransformParameterValue(c.value, c.lower, c.type, c.direction, failed), c.expected) << c.value;
+    EXPECT_EQ(failed, c.failed) << c.value;
+  }
+}
+
+TEST(BuildSearchSpace, TransformsTheVariableParametersInOrder) {
+  const std::vector<ModelParameter> parameters{
+      parameter("fixed", 99, 0, 1, TransformationType::logarithmic, ParameterType::fixed),
+      parameter("count  ", 3.7, 1, 5.5, TransformationType::integer),
+      parameter("dependent", 99, 0, 1, TransformationType::logarithmic, ParameterType::dependent),
+      parameter("k", 1e-5, 1e-6, 1e-3, TransformationType::logarithmic), parameter("same", 2, 2, 2)};
+  const SearchSpace space = BuildSearchSpace(parameters);
+  EXPECT_EQ(space.names, (std::vector<std::string>{"count", "k", "same"}));
+  EXPECT_EQ(space.initial, (std::vector<double>{3, std::log(1e-5), 2}));
+  EXPECT_EQ(space.lower, (std::vector<double>{1, std::log(1e-6), 2}));
+  EXPECT_EQ(space.upper, (std::vector<double>{6, std::log(1e-3), 2}));
+  EXPECT_EQ(ToModelScale(space, std::vector<double>{5.9999, std::log(1e-4), -0.1}),
+            (std::vector<double>{5, std::exp(std::log(1e-4)), -0.1}));
+}
+
+TEST(BuildSearchSpace, RefusesInItsOrder) {
+  constexpr auto kLog = TransformationType::logarithmic;
+  const struct {
+    std::vector<ModelParameter> parameters;
+    const char* message;
+  } cases[] = {
+      {{}, "Error: No variable model parameters defined"},
+      {{parameter("f", 1, 0, 2, kLog, ParameterType::fixed)}, "Error: No variable model parameters defined"},
+      {{parameter("low ", -1, 0, 2)}, "Error: Initial parameter value smaller than lower bound for parameter low"},
+      {{parameter("high", 3, 0, 2)}, "Error: Initial parameter value larger than upper bound for parameter high"},
+      {{parameter("swapped", 3, 4, 2)},
+       "Error: Initial parameter value smaller than lower bound for parameter swapped"},
+      {{parameter("zero", 1, 0, 2, kLog)}, "Error: Invalid parameter transformation for parameter zero"},
+      {{parameter("both", -1, 0, 2, kLog)},
+       "Error: Initial parameter value smaller than lower bound for parameter both"},
+      {{parameter("first", 1, 0, 2, kLog), parameter("second", 3, 0, 2)},
+       "Error: Invalid parameter transformation for parameter first"},
+  };
+  for (const auto& [parameters, message] : cases) {
+    try {
+      BuildSearchSpace(parameters);
+      ADD_FAILURE() << "not refused: " << message;
+    } catch (const FatalError& error) {
+      EXPECT_EQ(error.message(), message);
+    }
+  }
+}
+
+}  // namespace
+}  // namespace mirevo

@@ -1,0 +1,214 @@
+#include "parameters/template_file.h"
+
+#include <algorithm>
+#include <filesystem>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "common/fatal_error.h"
+#include "common/files.h"
+
+namespace mirevo {
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::HasSubstr;
+
+std::vector<ModelParameter> parameters() {
+  const auto make = [](std::string name, double id, double initial, double lower, double upper) {
+    ModelParameter parameter;
+    parameter.name = std::move(name);
+    parameter.idValue = id;
+    parameter.initialValue = initial;
+    parameter.lowerBound = lower;
+    parameter.upperBound = upper;
+    return parameter;
+  };
+  return {make("K", 1.0e-35, 0.5, 0.01, 100),  make("Manning channel", 1.5e-35, 0.03, 0.01, 0.2),
+          make("a 1.1e-35", 1.1e-35, 1, 0, 2), make("K2  ", 1.2e-35, 50, 10, 99),
+          make("no id", 0, 1, 0, 2),           make(" K", 1.2e-35, 1, 0, 2)};
+}
+
+std::string converted(const std::string& line) {
+  const std::string text = ConvertIdTemplate("model.tpl", line + "\n", parameters());
+  EXPECT_EQ(text.substr(0, 2), "!\n");
+  return text.substr(2, text.size() - 3);
+}
+
+template <typename Call>
+FatalError refused(Call call) {
+  try {
+    call();
+  } catch (const FatalError& error) {
+    return error;
+  }
+  ADD_FAILURE() << "not refused";
+  return FatalError("");
+}
+
+TEST(ConvertIdTemplate, ReplacesIdValues) {
+  const struct {
+    const char* line;
+    const char* expected;
+  } cases[] = {
+      {"no value here   ", "no value here"},
+      {"x 1E-35 y", "x !K        ! y"},
+      {"x 1.0E-035", "x !K        !"},
+      {"x\t1.0e-35\ty", "x\t!K        !\ty"},
+      {" 1.5e-035 1.5E-35 1.0E-035", " !Manning channel! !Manning channel! !K        !"},
+      // The token in column 1 keeps its first character.
+      {"1.5E-035 b", "1!Manning channel! b"},
+      {" 1.5E-035 b", " !Manning channel! b"},
+      // What follows the suffix stays; the exponent of three digits is taken before that of two.
+      {"x 1.0E-035,2", "x !K        !,2"},
+      {"x 1.0E-350", "x !K        !0"},
+      // A name that looks like an ID value itself is not converted again.
+      {"x 1.1e-35 1e-35", "x !a 1.1e-35! !K        !"},
+      // The first of two parameters with one ID value; its name without trailing blanks.
+      {"x 12E-036 1.2e-35", "x 12E-036 !K2       !"},
+      {"x 0e-35", "x !no id    !"},
+      {"1.0E-0", "1.0E-0"},
+  };
+  for (const auto& [line, expected] : cases) EXPECT_EQ(converted(line), expected) << line;
+}
+
+TEST(ConvertIdTemplate, RefusesUndefinedIdValues) {
+  const struct {
+    const char* line;
+    const char* token;
+  } cases[] = {
+      {"x 2.0E-035", "2.0E-035"},
+      {"see table-35", "table-35"},
+      {"e-35", "e-35"},
+      {"x 1e-35,1.5E-35", "1e-35,1.5E-35"},
+      {"1e-35,1.5e-35", "!,1.5e-35"},
+      {"x 99999999999e-35", "99999999999e-35"},
+      {"x k=1e-35", "k=1e-35"},
+  };
+  for (const auto& [line, token] : cases) {
+    const FatalError error = refused([&] { converted(std::string("first line\n") + line); });
+    EXPECT_EQ(error.message(), std::string("Error: Undefined parameter ID value ") + token + " found in template file");
+    EXPECT_THAT(error.detail(), HasSubstr("model.tpl:2:")) << line;
+  }
+}
+
+TEST(ConvertIdTemplate, KeepsLinesAndEndsThemAlike) {
+  EXPECT_EQ(ConvertIdTemplate("t", "a \r\n\r\n  b\t\r\nlast", parameters()), "!\na\n\n  b\t\nlast\n");
+  EXPECT_EQ(ConvertIdTemplate("t", "", parameters()), "!\n");
+  EXPECT_EQ(ConvertIdTemplate("t", std::string(50000, 'x') + "   ", parameters()).size(), 50003);
+  EXPECT_EQ(refused([] { ConvertIdTemplate("t", "a\n" + std::string(50001, 'x'), parameters()); }).message(),
+            "Error: Line 2 of template file t is too long");
+}
+
+TEST(ParameterTemplate, FillsPlaceholders) {
+  const std::vector<double> values{12.5, 0, 1, 1e100, 5, 7};
+  const struct {
+    const char* text;
+    const char* expected;
+  } cases[] = {
+      {"$\nplain   \n", "plain\n"},
+      {"$", ""},
+      {"$ is the delimiter\n$K    $", "   12.5\n"},
+      {"  #\r\n#K    #!#no id#\r\n", "   12.5!      5\n"},
+      {"\xEF\xBB\xBF!\n!K!", "12.\n"},
+      {"!\n!K  !!K  !", " 12.5 12.5\n"},
+      {"!\nx !Manning channel! y", "x                 0 y\n"},
+      // Leading blanks of a name count, trailing ones do not.
+      {"!\n! K ! !K !", "    7 12.5\n"},
+      // Blanks behind a value go at the end of a line and stay before other text.
+      {"!\n   !K                        !  \n!K                        !x",
+       "                   12.5\n                12.5       x\n"},
+      {"!\nx!K2        !", "x*\n"},
+  };
+  for (const auto& [text, expected] : cases) {
+    EXPECT_EQ(ParameterTemplate("t", text, parameters()).fill(values), expected) << text;
+  }
+  EXPECT_THAT(ParameterTemplate("t", "!\n!no id! !K!\n!K !", parameters()).parametersNamed(), ElementsAre(0, 4));
+}
+
+TEST(ParameterTemplate, RefusesWhatItCannotFill) {
+  const struct {
+    const char* text;
+    const char* message;
+    const char* detail;
+  } cases[] = {
+      {"", "Error: Delimiter not defined in template file t", "first line"},
+      {"   \n!K!", "Error: Delimiter not defined in template file t", "first line"},
+      {"1\n1K1", "Error: Delimiter not defined in template file t", "\"1\" is a character of numbers"},
+      {"§\n§K§", "Error: Delimiter not defined in template file t", "single-byte"},
+      {"!\n\nab !K", "Error: Parameter name  in template file  invalid", "t:3:4: the delimiter ! has no partner"},
+      {"!\n!!", "Error: Parameter name  in template file  invalid", "t:2:1: no parameter"},
+      {"!\n!   !", "Error: Parameter name  in template file  invalid", "t:2:1: no parameter"},
+      {"!\n!K! !Maning channel !", "Error: Parameter name Maning channel in template file Maning channel invalid",
+       "t:2:5: no parameter has the name that stands here between two !\ndid you mean \"Manning channel\"?"},
+      {"!\n!k!", "Error: Parameter name k in template file k invalid", "did you mean \"K\"?"},
+  };
+  for (const auto& [text, message, detail] : cases) {
+    const FatalError error = refused([&] { ParameterTemplate("t", text, parameters()); });
+    EXPECT_EQ(error.message(), message) << text;
+    EXPECT_THAT(error.detail(), HasSubstr(detail)) << text;
+  }
+}
+
+TEST(ParameterTemplate, WarnsOfNarrowPlaceholders) {
+  const auto warnings = [](const std::string& lines, std::vector<ModelParameter> list = parameters()) {
+    return ParameterTemplate("t", "!\n" + lines, list).narrowPlaceholderWarnings(list);
+  };
+  EXPECT_THAT(warnings("!K        ! !Manning channel! !K2  !"), ElementsAre());
+  const auto narrow = warnings("a\n !K!");
+  ASSERT_EQ(narrow.size(), 1);
+  EXPECT_EQ(
+      narrow[0],
+      "t:3: the placeholder of parameter \"K\" is 3 characters wide and keeps fewer than four significant digits: "
+      "0.5 is written as \"E-0\"; make it 9 wide, delimiters included, by blanks behind the name");
+  EXPECT_THAT(warnings("!K     !"), ElementsAre(HasSubstr("make it 9 wide"))) << "8 columns: 1.23E-02";
+  EXPECT_THAT(warnings("1!K        !"), ElementsAre(HasSubstr("touched by a digit")));
+  EXPECT_THAT(warnings("!K        !0"), ElementsAre(HasSubstr("touched by a digit")));
+
+  const auto with = [](ParameterType type, double lower, double upper, TransformationType transformation) {
+    std::vector<ModelParameter> list = parameters();
+    list[0].parameterType = type;
+    list[0].initialValue = list[0].lowerBound = lower;
+    list[0].upperBound = upper;
+    list[0].transformationType = transformation;
+    return list;
+  };
+  constexpr auto kNone = TransformationType::none;
+  EXPECT_THAT(warnings("!K  !", with(ParameterType::variable, 1, 500, TransformationType::integer)), ElementsAre());
+  EXPECT_THAT(warnings("!K!", with(ParameterType::fixed, 7, 0, kNone)), ElementsAre());
+  EXPECT_THAT(warnings("!K  !", with(ParameterType::dependent, 7, 7, kNone)),
+              ElementsAre(HasSubstr("make it 10 wide")));
+  EXPECT_THAT(warnings("!K           !", with(ParameterType::variable, 1e-120, 1, kNone)),
+              ElementsAre(HasSubstr("no width is enough")));
+  EXPECT_THAT(warnings("!K   !", with(ParameterType::variable, -100, 100, kNone)),
+              ElementsAre(HasSubstr("make it 10 wide")));
+}
+
+TEST(WriteParameterFile, RewritesAnExistingFileAndKeepsItsMode) {
+  const std::string folder = ::testing::TempDir() + "parameter_file_" + std::to_string(::getpid());
+  std::filesystem::create_directory(folder);
+  const std::string path = folder + "/model.inp";
+  std::string reason;
+  ASSERT_TRUE(writeByUnlinkAndCreate(path, "old and longer than what comes", 0640, reason));
+  const ParameterTemplate parameterTemplate("t", "!\nK = !K   !\n", parameters());
+  const std::vector<double> values(6, 3.25);
+
+  WriteParameterFile(path + "  ", parameterTemplate, values);
+  EXPECT_EQ(readTextFile(path, reason), "K =   3.25\n");
+  struct stat status {};
+  ASSERT_EQ(::stat(path.c_str(), &status), 0);
+  EXPECT_EQ(status.st_mode & 07777, 0640);
+
+  const FatalError missing = refused([&] { WriteParameterFile(folder + "/none.inp", parameterTemplate, values); });
+  EXPECT_EQ(missing.message(), "Error: Unable to open " + folder + "/none.inp");
+  EXPECT_EQ(missing.detail(), "No such file or directory");
+  EXPECT_EQ(refused([&] { WriteParameterFile(folder, parameterTemplate, values); }).message(),
+            "Error: Unable to open " + folder);
+  std::filesystem::remove_all(folder);
+}
+
+}  // namespace
+}  // namespace mirevo
