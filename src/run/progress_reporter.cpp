@@ -1,0 +1,155 @@
+#include "run/progress_reporter.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <cstring>
+#include <fcntl.h>
+#include <unistd.h>
+#include <utility>
+
+#include <fmt/format.h>
+
+#include "common/text.h"
+
+namespace mirevo {
+namespace {
+
+constexpr int kNowhere = -1;
+constexpr int kStandardOutput = 0;
+constexpr std::string_view kMessageFileEnding = "._spi_";
+constexpr std::string_view kKillFileEnding = "._kill_";
+constexpr std::size_t kSpeedWindow = 100;  ///< evaluations
+
+std::string baseNameOf(std::string_view runFileName) {
+  for (const std::string_view ending : {".log", ".inp"}) {
+    if (runFileName.ends_with(ending)) runFileName.remove_suffix(ending.size());
+  }
+  return std::string(runFileName);
+}
+
+/// One write(2), so that a viewer that reads along never sees half a record of an ordinary disk file.
+bool writeWhole(int descriptor, std::string_view record) {
+  while (!record.empty()) {
+    const ssize_t written = ::write(descriptor, record.data(), record.size());
+    if (written < 0 && errno == EINTR) continue;
+    if (written < 0) return false;
+    record.remove_prefix(static_cast<std::size_t>(written));
+  }
+  return true;
+}
+
+}  // namespace
+
+ProgressReporter::ProgressReporter(Clock clock) : clock_(std::move(clock)) {}
+
+ProgressReporter::~ProgressReporter() {
+  if (messageUnit_ > kStandardOutput) ::close(messageUnit_);
+}
+
+std::string ProgressReporter::progressInit(std::string_view runFileName, std::string_view destination) {
+  baseName_ = baseNameOf(runFileName);
+  std::string problems;
+  const std::string killFile = baseName_ + std::string(kKillFileEnding);
+  if (::unlink(killFile.c_str()) != 0 && errno != ENOENT) {
+    problems = fmt::format("Unable to remove the kill file of an earlier run: {}: {}", killFile, std::strerror(errno));
+  }
+  if (destination == "NONE") {
+    messageUnit_ = kNowhere;
+  } else if (destination == "STDOUT") {
+    messageUnit_ = kStandardOutput;
+  } else {
+    const std::string messageFile = baseName_ + std::string(kMessageFileEnding);
+    messageUnit_ = ::open(messageFile.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0666);
+    if (messageUnit_ < 0) {
+      if (!problems.empty()) problems += '\n';
+      problems += fmt::format("Unable to open TqQmon2 message file: {}: {}", messageFile, std::strerror(errno));
+    }
+  }
+  return problems;
+}
+
+void ProgressReporter::writeRecord(std::string_view kind, std::string_view text) {
+  if (messageUnit_ < 0) return;
+  std::string record;
+  if (messageUnit_ == kStandardOutput) {
+    if (kind != "MESSAG") return;
+    record = " ";  // list-directed output begins with a blank
+  } else {
+    record = kind;
+  }
+  record += text;
+  std::replace_if(
+      record.begin(), record.end(), [](char c) { return c == '\n' || c == '\r'; }, ' ');
+  record += '\n';
+  const int descriptor = messageUnit_ == kStandardOutput ? STDOUT_FILENO : messageUnit_;
+  if (writeWhole(descriptor, record)) return;
+  // A full disk or a closed pipe ends the reporting and not the run.
+  if (messageUnit_ > kStandardOutput) ::close(messageUnit_);
+  messageUnit_ = kNowhere;
+}
+
+void ProgressReporter::writeStatus(std::string_view text) {
+  writeRecord("STATUS", text);
+}
+void ProgressReporter::writeStatusLabel(std::string_view text) {
+  writeRecord("STALBL", text);
+}
+void ProgressReporter::writeMessage(std::string_view text) {
+  writeRecord("MESSAG", text);
+}
+void ProgressReporter::writeMessageLabel(std::string_view text) {
+  writeRecord("MESLBL", text);
+}
+void ProgressReporter::writeSpeed(std::string_view text) {
+  writeRecord("COMSPD", text);
+}
+void ProgressReporter::writeTimeLeft(std::string_view text) {
+  writeRecord("TIMLFT", text);
+}
+void ProgressReporter::writeProgress(std::string_view text) {
+  writeRecord("PROGRE", text);
+}
+
+void ProgressReporter::progressStart() {
+  writeStatus("Initialisation");
+  writeProgress("0.0");
+}
+
+void ProgressReporter::progressEvaluationLabel(int plannedEvaluations) {
+  plannedEvaluations_ = plannedEvaluations;
+  completedEvaluations_ = 0;
+  times_.assign(1, clock_());
+  writeStatusLabel("Model evaluation");
+  writeMessageLabel(withNumber(" of %", plannedEvaluations));
+}
+
+void ProgressReporter::progressStep() {
+  ++completedEvaluations_;
+  times_.push_back(clock_());
+  if (times_.size() > kSpeedWindow + 1) times_.pop_front();
+  const double seconds = times_.back() - times_.front();
+  if (seconds > 0.0) {
+    const double perSecond = static_cast<double>(times_.size() - 1) / seconds;
+    const int left = std::max(0, plannedEvaluations_ - completedEvaluations_);
+    writeSpeed(fmt::format("{:.6g}", perSecond));
+    writeTimeLeft(fmt::format("{:.0f}", left / perSecond));
+  }
+  if (plannedEvaluations_ > 0) {
+    const double percent = std::min(100.0, 100.0 * completedEvaluations_ / plannedEvaluations_);
+    writeProgress(fmt::format("{:.1f}", percent));
+  }
+  isCancelled();
+}
+
+void ProgressReporter::progressEnd() {
+  writeProgress("100.0");
+  if (messageUnit_ > kStandardOutput) ::close(messageUnit_);
+  messageUnit_ = kNowhere;
+}
+
+bool ProgressReporter::isCancelled() {
+  if (!cancelled_) cancelled_ = ::access((baseName_ + std::string(kKillFileEnding)).c_str(), F_OK) == 0;
+  return cancelled_;
+}
+
+}  // namespace mirevo

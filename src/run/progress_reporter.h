@@ -1,0 +1,59 @@
+#pragma once
+
+#include <deque>
+#include <functional>
+#include <string>
+#include <string_view>
+
+namespace mirevo {
+
+/// Tells an outside viewer how the run is going, and learns from a kill file that the run is to stop. The records and
+/// their numbers are described in docs/progress-format.md.
+class ProgressReporter final {
+ public:
+  /// Seconds from any origin, never running backwards.
+  using Clock = std::function<double()>;
+
+  explicit ProgressReporter(Clock clock);
+  ~ProgressReporter();
+  ProgressReporter(const ProgressReporter&) = delete;
+  ProgressReporter& operator=(const ProgressReporter&) = delete;
+
+  /// Chooses where records go by `destination`, the value of VOLK_PROGRESS ("NONE", "STDOUT", anything else a message
+  /// file), and removes the kill file of an earlier run. `runFileName` is the path of the run's log or input file.
+  /// Returns what there is to report, one line a problem; empty when all is well. The run goes on in any case.
+  std::string progressInit(std::string_view runFileName, std::string_view destination);
+
+  void writeStatus(std::string_view text);
+  void writeStatusLabel(std::string_view text);
+  void writeMessage(std::string_view text);
+  void writeMessageLabel(std::string_view text);
+  void writeSpeed(std::string_view text);
+  void writeTimeLeft(std::string_view text);
+  void writeProgress(std::string_view text);
+
+  void progressStart();
+  /// Before the first evaluation: `plannedEvaluations` is what progressStep() counts towards.
+  void progressEvaluationLabel(int plannedEvaluations);
+  /// After each completed evaluation: speed, time left and percentage; then looks for the kill file.
+  void progressStep();
+  void progressEnd();
+
+  /// Whether the run was told to stop. Once it has been, it stays so and the disk is not asked again.
+  bool isCancelled();
+
+ private:
+  void writeRecord(std::string_view kind, std::string_view text);
+
+  Clock clock_;
+  std::string baseName_;
+  int messageUnit_ = -1;  ///< < 0 nowhere, 0 standard output, > 0 the message file's descriptor
+  bool cancelled_ = false;
+  int plannedEvaluations_ = 0;
+  int completedEvaluations_ = 0;
+  /// When the counting began and the latest evaluations were completed, oldest first: the speed is taken over these, so
+  /// that it follows a model that becomes slower, and slots that end together do not make it jump.
+  std::deque<double> times_;
+};
+
+}  // namespace mirevo

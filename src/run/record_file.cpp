@@ -1,0 +1,79 @@
+#include "run/record_file.h"
+
+#include <cerrno>
+#include <cstdio>
+#include <cstring>
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <fmt/format.h>
+
+#include "common/fatal_error.h"
+
+namespace mirevo {
+
+RecordFile::~RecordFile() {
+  close();
+}
+
+void RecordFile::open(const std::string& path) {
+  close();
+  path_ = path;
+  size_ = 0;
+  failed_ = false;
+  descriptor_ = ::open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0666);
+  if (descriptor_ < 0) fatalError("Error: Unable to open " + path, std::strerror(errno));
+}
+
+void RecordFile::append(std::string_view record) {
+  std::string reason;
+  if (!failed_ && !tryAppend(record, reason)) fatalError("Error: Unable to write to " + path_, reason);
+}
+
+bool RecordFile::tryAppend(std::string_view record, std::string& reason) {
+  if (descriptor_ < 0 || failed_) {
+    reason = "the file is closed";
+    return false;
+  }
+  const std::size_t length = record.size();
+  while (!record.empty()) {
+    const ssize_t written = ::write(descriptor_, record.data(), record.size());
+    if (written < 0 && errno == EINTR) continue;
+    if (written < 0) {
+      reason = std::strerror(errno);
+      failed_ = true;
+      // What fitted of the record is no record: readers of the file would take it for one.
+      if (::ftruncate(descriptor_, size_) != 0 && errno != EINVAL) reason += ", and its last line is cut off";
+      return false;
+    }
+    record.remove_prefix(static_cast<std::size_t>(written));
+  }
+  size_ += static_cast<std::int64_t>(length);
+  return true;
+}
+
+void RecordFile::close() {
+  if (descriptor_ >= 0) ::close(descriptor_);
+  descriptor_ = -1;
+}
+
+std::string keepEarlierFile(const std::string& path) {
+  struct stat status {};
+  if (::lstat(path.c_str(), &status) != 0 || !S_ISREG(status.st_mode)) return {};
+  const std::size_t nameStart = path.rfind('/') == std::string::npos ? 0 : path.rfind('/') + 1;
+  const std::size_t dot = path.rfind('.');
+  const std::size_t stemEnd = dot == std::string::npos || dot <= nameStart ? path.size() : dot;
+  std::string kept;
+  for (int number = 1; kept.empty() || ::lstat(kept.c_str(), &status) == 0; ++number) {
+    kept = fmt::format("{}.{}{}", path.substr(0, stemEnd), number, path.substr(stemEnd));
+  }
+  if (::rename(path.c_str(), kept.c_str()) != 0) {
+    const char* reason = std::strerror(errno);
+    fatalError("Error: Unable to keep the earlier file " + path,
+               fmt::format("It cannot be renamed to {}: {}", kept, reason));
+  }
+  return kept;
+}
+
+}  // namespace mirevo

@@ -1,0 +1,56 @@
+#pragma once
+
+#include <cstdint>
+#include <span>
+#include <string>
+#include <vector>
+
+#include "evaluation/evaluation_result.h"
+#include "run/record_file.h"
+
+namespace mirevo {
+
+/// The names over the columns of a result file.
+struct ResultColumns {
+  std::vector<std::string> parameters;  ///< variable parameters
+  std::vector<std::string> measures;
+  std::vector<std::string> objectives;
+};
+
+/// The table of a run's evaluations: `#` head lines, a header row, a row an evaluation, `#` closing lines. Rows are
+/// written as evaluations arrive, so that a killed run leaves every finished one on disk; a file that ends orderly
+/// holds them in the order of their numbers.
+class ResultFile final {
+ public:
+  /// Creates the file with its head lines (without "# ") and its header row. Throws FatalError.
+  void open(const std::string& path, std::span<const std::string> headLines, const ResultColumns& columns);
+
+  /// One evaluation: `parameterValues` on the model scale, one a column. Throws FatalError when it cannot be written.
+  void addRow(std::span<const double> parameterValues, const EvaluationResult& result);
+
+  /// Brings the rows into the order of their numbers and writes the closing lines (without "# "). False, with the
+  /// system's reason, when that fails; what was written before is then still there. Nothing happens to a file that is
+  /// not open.
+  bool finish(std::span<const std::string> closingLines, std::string& reason);
+
+  bool isOpen() const { return file_.isOpen(); }
+  const std::string& path() const { return file_.path(); }
+
+ private:
+  struct Row {
+    int number;
+    std::int64_t offset;
+    std::int64_t length;
+  };
+  bool isInOrder() const;
+  bool rewriteInOrder(std::string_view closing, std::string& reason) const;
+
+  RecordFile file_;
+  std::int64_t headLength_ = 0;
+  std::vector<Row> rows_;
+};
+
+/// A name as a column's heading: nothing in it that a reader of tab-separated values takes for something else.
+std::string columnName(std::string_view name);
+
+}  // namespace mirevo

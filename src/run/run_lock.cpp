@@ -1,0 +1,29 @@
+#include "run/run_lock.h"
+
+#include <cerrno>
+#include <fcntl.h>
+#include <sys/file.h>
+#include <unistd.h>
+
+#include "platform/front_end.h"
+
+namespace mirevo {
+
+RunLock::~RunLock() {
+  if (descriptor_ >= 0) ::close(descriptor_);
+}
+
+bool RunLock::take(const std::string& setupFile, double patienceSeconds) {
+  descriptor_ = ::open(setupFile.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK);
+  if (descriptor_ < 0) return true;
+  const double deadline = runTimeClock() + patienceSeconds;
+  while (::flock(descriptor_, LOCK_EX | LOCK_NB) != 0) {
+    if (errno == EINTR) continue;
+    if (errno != EWOULDBLOCK) return true;
+    if (runTimeClock() >= deadline) return false;
+    ::usleep(50'000);
+  }
+  return true;
+}
+
+}  // namespace mirevo

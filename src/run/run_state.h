@@ -1,0 +1,21 @@
+#pragma once
+
+#include <vector>
+
+#include "platform/front_end.h"
+#include "run/progress_reporter.h"
+#include "run/run_log.h"
+
+namespace mirevo {
+
+/// What a run has once, owned by the run driver and handed down.
+struct RunState {
+  int mpiRank = -1;  ///< -1 without MPI, 0 the master, above 0 a worker
+  int mpiProcessCount = 1;
+  bool mpiInUse = false;
+  RunLog log;
+  ProgressReporter progress{runTimeClock};
+  std::vector<double> objectiveValues;  ///< of the last model run, one an objective function
+};
+
+}  // namespace mirevo

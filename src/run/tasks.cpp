@@ -1,0 +1,164 @@
+#include "run/tasks.h"
+
+#include <fmt/format.h>
+
+#include "algorithms/uniform_generator.h"
+#include "common/fatal_error.h"
+#include "common/text.h"
+#include "run/search_factory.h"
+
+namespace mirevo {
+namespace {
+
+constexpr std::string_view kEndOfTask = "Normal termination";
+
+void logValues(RunLog& log, std::string_view heading, std::span<const std::string> names,
+               std::span<const double> values) {
+  log.line(heading);
+  for (std::size_t i = 0; i < names.size() && i < values.size(); ++i) {
+    log.line(fmt::format("   {} = {}", names[i], formatReal(values[i])));
+  }
+}
+
+void logBestSet(const TaskContext& context, const ParameterSet& best, const EvaluationResult& result) {
+  std::vector<std::string> objectives;
+  for (const ObjectiveFunction& objective : context.config.objectives) objectives.push_back(objective.name);
+  logValues(context.log, "Best parameter set:", context.space.names, ToModelScale(context.space, best));
+  logValues(context.log, "Objective functions:", objectives, result.objectiveValues);
+  context.log.line(fmt::format("Aggregate: {}", formatReal(result.aggregate)));
+}
+
+std::string runScenarios(const TaskContext& context) {
+  const std::int32_t type = context.config.scenario.scenarioType;
+  if (type == 0) {
+    const std::vector<ParameterSet> sets{context.space.initial};
+    context.evaluator.evaluateParameterSets(sets, DispatchMode::task);
+  } else if (type == 1) {
+    context.evaluator.evaluateParameterSets(scenarioSets(context.config), DispatchMode::task);
+  }
+  return std::string(kEndOfTask);
+}
+
+std::string runOptimisation(const TaskContext& context) {
+  const OptimisationConfig& optimisation = context.config.optimisation;
+  const bool isKnownSearch = !searchShortName(optimisation.algorithmType).empty();
+  if (optimisation.useSurrogateModel != 0 && optimisation.useSurrogateModel != 1) return std::string(kEndOfTask);
+  if (!isKnownSearch) return std::string(kEndOfTask);
+
+  UniformGenerator random(context.config.randomSeed);
+  SearchBounds bounds{context.space.lower, context.space.upper, context.space.initial};
+  const auto search = createSearch(optimisation, std::move(bounds), context.evaluator, random);
+  runSearch(*search, searchShortName(optimisation.algorithmType));
+
+  const SearchSummary& summary = search->summary();
+  context.log.line("");
+  context.log.line(summary.terminationMessage);
+  const std::vector<ParameterSet> best{summary.best};
+  if (best.front().empty()) return summary.terminationMessage;
+  logBestSet(context, best.front(), summary.bestResult);
+  context.log.line("");
+  context.log.line("Final model run with the best parameter set:");
+  context.evaluator.evaluateParameterSets(best, DispatchMode::task);
+  return summary.terminationMessage;
+}
+
+std::string runSensitivity(const TaskContext& context) {
+  if (context.config.sensitivity.sensitivityType == 0) {
+    fatalError("Error: Local sensitivity analysis is not available in this version");
+  }
+  return std::string(kEndOfTask);
+}
+
+}  // namespace
+
+std::string runTask(const TaskContext& context) {
+  switch (context.config.simulationOption) {
+    case SimulationOption::scenarioRuns:
+      return runScenarios(context);
+    case SimulationOption::sensitivityAnalysis:
+      return runSensitivity(context);
+    case SimulationOption::parameterOptimisation:
+      return runOptimisation(context);
+    case SimulationOption::uncertaintyAnalysis:
+      fatalError("Error: Uncertainty analysis is not available in this version");
+  }
+  return std::string(kEndOfTask);
+}
+
+std::string taskName(const RunConfig& config) {
+  switch (config.simulationOption) {
+    case SimulationOption::scenarioRuns:
+      return config.scenario.scenarioType == 0 ? "Scenario runs: Single run using initial parameter set"
+                                               : "Scenario runs: Multiple runs";
+    case SimulationOption::sensitivityAnalysis:
+      return "Sensitivity analysis: Local sensitivity analysis";
+    case SimulationOption::parameterOptimisation: {
+      std::string name = "Parameter optimisation";
+      switch (config.optimisation.algorithmType) {
+        case AlgorithmType::sce:
+          name += ": Shuffled Complex Evolution";
+          break;
+        case AlgorithmType::pse:
+          name += ": Population Simplex Evolution";
+          break;
+        case AlgorithmType::dds:
+          name += ": Dynamically Dimensioned Search";
+          break;
+      }
+      return config.optimisation.useSurrogateModel == 1 ? name + " with surrogate model" : name;
+    }
+    case SimulationOption::uncertaintyAnalysis:
+      return "Uncertainty analysis";
+  }
+  return {};
+}
+
+std::string_view resultFileEnding(const RunConfig& config) {
+  switch (config.simulationOption) {
+    case SimulationOption::scenarioRuns:
+    case SimulationOption::uncertaintyAnalysis:
+      return ".dat";
+    case SimulationOption::sensitivityAnalysis:
+      return "_Sensitivity.dat";
+    case SimulationOption::parameterOptimisation:
+      return "_Optimisation.dat";
+  }
+  return {};
+}
+
+std::vector<ParameterSet> scenarioSets(const RunConfig& config) {
+  std::vector<ParameterSet> sets;
+  for (std::size_t run = 0; run < config.scenario.runs.size(); ++run) {
+    const std::vector<double>& values = config.scenario.runs[run];
+    ParameterSet set;
+    for (std::size_t i = 0; i < config.parameters.size(); ++i) {
+      const ModelParameter& parameter = config.parameters[i];
+      if (parameter.parameterType != ParameterType::variable) continue;
+      bool failed = i >= values.size();
+      if (!failed) {
+        set.push_back(TransformParameterValue(values[i], parameter.lowerBound, parameter.transformationType,
+                                              TransformDirection::forward, failed));
+      }
+      if (failed) {
+        fatalError("Error: Invalid parameter transformation for parameter " + parameter.name,
+                   fmt::format("Scenario run {} has {}.", run + 1,
+                               i < values.size() ? "the value " + formatReal(values[i]) + ", which has no logarithm"
+                                                 : "no value for it"));
+      }
+    }
+    sets.push_back(std::move(set));
+  }
+  return sets;
+}
+
+void runSearch(SearchAlgorithm& search, std::string_view shortName) {
+  const auto check = [shortName](SearchStatus status) {
+    if (status == kSearchOk) return;
+    fatalError(fmt::format("Error: Invalid operation in {} algorithm", shortName),
+               fmt::format("A step of it ended with status {}.", status));
+  };
+  check(search.initialise());
+  while (!search.isTerminated()) check(search.advance());
+}
+
+}  // namespace mirevo

@@ -1,0 +1,9 @@
+#include "run/version.h"
+
+namespace mirevo {
+
+std::string_view programVersion() {
+  return MIREVO_VERSION;
+}
+
+}  // namespace mirevo

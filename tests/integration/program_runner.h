@@ -1,0 +1,104 @@
+#pragma once
+
+#include <cstdlib>
+#include <fcntl.h>
+#include <fstream>
+#include <functional>
+#include <map>
+#include <poll.h>
+#include <signal.h>
+#include <string>
+#include <sys/syscall.h>
+#include <sys/wait.h>
+#include <time.h>
+#include <unistd.h>
+#include <vector>
+
+#include "run/temporary_folder.h"
+
+namespace mirevo::testing {
+
+/// How the program ended and what it printed.
+struct ProgramResult {
+  int exitCode = -1;  ///< -1 when a signal ended it
+  int signal = 0;
+  bool timedOut = false;
+  std::string output;
+  std::string error;
+};
+
+/// The built program, started as its user starts it. It is killed when it outlives its time or the test.
+class RunningProgram {
+ public:
+  using Environment = std::map<std::string, std::string>;
+
+  explicit RunningProgram(const std::vector<std::string>& arguments, const Environment& environment = {}) {
+    process_ = ::fork();
+    if (process_ != 0) return;
+    ::dup2(::open(outputs_.file("out").c_str(), O_WRONLY | O_CREAT, 0666), STDOUT_FILENO);
+    ::dup2(::open(outputs_.file("err").c_str(), O_WRONLY | O_CREAT, 0666), STDERR_FILENO);
+    for (const char* name : {"G48", "BUILDMODE", "VOLK_PROGRESS"}) ::unsetenv(name);
+    for (const auto& [name, value] : environment) ::setenv(name.c_str(), value.c_str(), 1);
+    std::vector<char*> argv{const_cast<char*>(MIREVO_PROGRAM)};
+    for (const std::string& argument : arguments) argv.push_back(const_cast<char*>(argument.c_str()));
+    argv.push_back(nullptr);
+    ::execv(MIREVO_PROGRAM, argv.data());
+    ::_exit(127);
+  }
+  ~RunningProgram() {
+    if (process_ > 0) wait(0.0);
+  }
+  RunningProgram(const RunningProgram&) = delete;
+  RunningProgram& operator=(const RunningProgram&) = delete;
+
+  void send(int signal) const { ::kill(process_, signal); }
+
+  ProgramResult wait(double seconds = 60.0) {
+    ProgramResult result;
+    const int watched = static_cast<int>(::syscall(SYS_pidfd_open, process_, 0));
+    pollfd ended{watched, POLLIN, 0};
+    if (::poll(&ended, 1, static_cast<int>(seconds * 1000.0)) == 0) {
+      result.timedOut = true;
+      ::kill(process_, SIGKILL);
+    }
+    int status = 0;
+    ::waitpid(process_, &status, 0);
+    ::close(watched);
+    process_ = 0;
+    if (WIFEXITED(status)) result.exitCode = WEXITSTATUS(status);
+    if (WIFSIGNALED(status)) result.signal = WTERMSIG(status);
+    result.output = outputs_.read("out");
+    result.error = outputs_.read("err");
+    return result;
+  }
+
+ private:
+  TemporaryFolder outputs_;
+  pid_t process_ = 0;
+};
+
+inline ProgramResult runProgram(const std::vector<std::string>& arguments,
+                                const RunningProgram::Environment& environment = {}) {
+  return RunningProgram(arguments, environment).wait();
+}
+
+/// Waits for something that another process does; false when it has not come in time.
+inline bool waitUntil(const std::function<bool()>& condition, double seconds = 20.0) {
+  for (int i = 0; i < static_cast<int>(seconds * 100.0); ++i) {
+    if (condition()) return true;
+    const timespec pause{0, 10'000'000};
+    ::nanosleep(&pause, nullptr);
+  }
+  return condition();
+}
+
+/// Whether a process runs; one that has ended and was not reaped yet does not.
+inline bool isRunning(int process) {
+  std::ifstream status("/proc/" + std::to_string(process) + "/stat");
+  std::string text;
+  if (!std::getline(status, text)) return false;
+  const auto state = text.rfind(") ");
+  return state != std::string::npos && text[state + 2] != 'Z' && text[state + 2] != 'X';
+}
+
+}  // namespace mirevo::testing

@@ -1,0 +1,96 @@
+#include "run/progress_reporter.h"
+
+#include <gtest/gtest.h>
+
+#include "run/temporary_folder.h"
+
+namespace mirevo {
+namespace {
+
+class ProgressReporterTest : public ::testing::Test {
+ protected:
+  std::string init(ProgressReporter& reporter, const std::string& destination = "") {
+    return reporter.progressInit(folder_.file("basin.log"), destination);
+  }
+
+  testing::TemporaryFolder folder_;
+  double now_ = 1000.0;
+  ProgressReporter reporter_{[this] { return now_; }};
+};
+
+TEST_F(ProgressReporterTest, AMessageFileHoldsOneRecordALineKindFirst) {
+  folder_.write("basin._spi_", "left from an earlier and longer run, which must not show through\n");
+  EXPECT_EQ(init(reporter_), "");
+  reporter_.progressStart();
+  reporter_.progressEvaluationLabel(4);
+  reporter_.writeMessage("two\nlines");
+  now_ += 2.0;
+  reporter_.progressStep();
+  now_ += 2.0;
+  reporter_.progressStep();
+  reporter_.progressEnd();
+  reporter_.writeMessage("after the end");
+  EXPECT_EQ(folder_.read("basin._spi_"),
+            "STATUSInitialisation\nPROGRE0.0\nSTALBLModel evaluation\nMESLBL of 4\nMESSAGtwo lines\n"
+            "COMSPD0.5\nTIMLFT6\nPROGRE25.0\nCOMSPD0.5\nTIMLFT4\nPROGRE50.0\nPROGRE100.0\n");
+}
+
+TEST_F(ProgressReporterTest, StandardOutputTakesMessagesAloneAndNoneTakesNothing) {
+  for (const std::string destination : {"STDOUT", "NONE"}) {
+    ProgressReporter reporter([this] { return now_; });
+    EXPECT_EQ(init(reporter, destination), "");
+    ::testing::internal::CaptureStdout();
+    reporter.progressStart();
+    reporter.progressEvaluationLabel(2);
+    reporter.writeMessage("Evaluation of parameter set No. 1 initiated");
+    reporter.progressStep();
+    reporter.progressEnd();
+    EXPECT_EQ(::testing::internal::GetCapturedStdout(),
+              destination == "STDOUT" ? " Evaluation of parameter set No. 1 initiated\n" : "");
+    EXPECT_FALSE(folder_.has("basin._spi_"));
+  }
+}
+
+TEST_F(ProgressReporterTest, SpeedFollowsTheLatestEvaluationsAndProgressStopsAtAHundred) {
+  init(reporter_);
+  reporter_.progressEvaluationLabel(320);
+  for (int i = 0; i < 200; ++i) reporter_.progressStep();  // no time passes: no speed can be told
+  EXPECT_EQ(folder_.read("basin._spi_").find("COMSPD"), std::string::npos);
+  for (int i = 0; i < 150; ++i) {
+    now_ += 10.0;
+    reporter_.progressStep();
+  }
+  const std::string records = folder_.read("basin._spi_");
+  EXPECT_TRUE(records.ends_with("COMSPD0.1\nTIMLFT0\nPROGRE100.0\n")) << records.substr(records.size() - 60);
+  EXPECT_NE(records.find("COMSPD0.1\nTIMLFT10\nPROGRE99.7\n"), std::string::npos);
+}
+
+TEST_F(ProgressReporterTest, OnlyAKillFileOfThisRunCancelsItAndForGood) {
+  folder_.write("basin._kill_", "");
+  init(reporter_);
+  EXPECT_FALSE(folder_.has("basin._kill_"));
+  EXPECT_FALSE(reporter_.isCancelled());
+  folder_.write("basin._kill_", "");
+  reporter_.progressStep();
+  std::filesystem::remove(folder_.file("basin._kill_"));
+  EXPECT_TRUE(reporter_.isCancelled());
+}
+
+TEST_F(ProgressReporterTest, AMessageFileThatCannotBeOpenedIsReportedAndTheRunGoesOn) {
+  std::filesystem::create_directories(folder_.file("basin._spi_"));
+  EXPECT_TRUE(init(reporter_).starts_with("Unable to open TqQmon2 message file: " + folder_.file("basin._spi_")));
+  reporter_.progressStart();
+  reporter_.progressStep();
+  EXPECT_FALSE(reporter_.isCancelled());
+}
+
+TEST_F(ProgressReporterTest, TheBaseNameLosesOnlyAKnownEnding) {
+  for (const auto& [file, messages] : {std::pair{"a.log", "a._spi_"}, {"b.inp", "b._spi_"}, {"c.txt", "c.txt._spi_"}}) {
+    ProgressReporter reporter([this] { return now_; });
+    reporter.progressInit(folder_.file(file), "");
+    EXPECT_TRUE(folder_.has(messages)) << file;
+  }
+}
+
+}  // namespace
+}  // namespace mirevo

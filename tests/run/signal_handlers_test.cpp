@@ -1,0 +1,128 @@
+#include "run/signal_handlers.h"
+
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <fcntl.h>
+#include <fenv.h>
+#include <signal.h>
+#include <unistd.h>
+
+#include <fmt/format.h>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "run/signal_state.h"
+#include "run/stop_run.h"
+#include "run/temporary_folder.h"
+
+namespace mirevo {
+namespace {
+
+/// In a process of its own: logs opened and handlers installed as the run does it, then `act`.
+template <typename Act>
+void actWithHandlers(const testing::TemporaryFolder& folder, const char* buildMode, const char* frontEnd, Act act) {
+  const auto open = [&](const char* name) {
+    return ::open(folder.file(name).c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_APPEND, 0666);
+  };
+  ::setenv("BUILDMODE", buildMode, 1);
+  ::setenv("G48", frontEnd, 1);
+  ::dup2(open("stdout"), STDOUT_FILENO);
+  signalState.runLogDescriptor = open("run.log");
+  setTerminationLogUnit(open("termination.log"));
+  installSignalHandlers();
+  act();
+  ::_exit(0);
+}
+
+const struct {
+  int signal;
+  const char* message;
+} kSignals[] = {{SIGABRT, "Abnormal termination"},   {SIGILL, "Illegal instruction"},  {SIGINT, "Control-C send"},
+                {SIGSEGV, "Illegal storage access"}, {SIGTERM, "Termination request"}, {SIGHUP, "Termination request"}};
+
+TEST(SignalHandlers, EverySignalEndsTheRunWithItsMessageInEveryPlace) {
+  for (const auto& [signal, message] : kSignals) {
+    const testing::TemporaryFolder folder;
+    EXPECT_EXIT(actWithHandlers(folder, "", "WIN", [signal = signal] { ::raise(signal); }),
+                ::testing::ExitedWithCode(128 + signal), message);
+    EXPECT_EQ(folder.read("run.log"), fmt::format("\n{}\n", message));
+    EXPECT_EQ(folder.read("termination.log"), std::string(message) + "\nAbnormal completion\n");
+  }
+}
+
+TEST(SignalHandlers, AnUnattendedRunShowsTheMessageOnlyWithoutAFrontEnd) {
+  for (const char* frontEnd : {"WIN", "QMON", ""}) {
+    const testing::TemporaryFolder folder;
+    EXPECT_EXIT(actWithHandlers(folder, "NIGHT", frontEnd, [] { ::raise(SIGTERM); }), ::testing::ExitedWithCode(143),
+                "^$");
+    EXPECT_EQ(folder.read("stdout"), *frontEnd == '\0' ? "Termination request\n" : "");
+    EXPECT_EQ(folder.read("termination.log"), "Termination request\nAbnormal completion\n");
+  }
+}
+
+TEST(SignalHandlers, TheReasonIsLoggedBeforeTheModelIsHalted) {
+  const testing::TemporaryFolder folder;
+  const auto haltWhileSayingSo = [] {
+    signalState.haltProcesses = [] { writeLineFromSignal(signalState.runLogDescriptor, "halted"); };
+    ::raise(SIGINT);
+  };
+  EXPECT_EXIT(actWithHandlers(folder, "", "WIN", haltWhileSayingSo), ::testing::ExitedWithCode(130), "");
+  EXPECT_EQ(folder.read("run.log"), "\nControl-C send\nhalted\n");
+}
+
+TEST(SignalHandlers, FloatingPointSubCodesHaveTheirOwnMessages) {
+  const struct {
+    int signalCode;
+    const char* message;
+  } cases[] = {{FPE_FLTINV, "Floating point exception: Invalid number"},
+               {FPE_FLTDIV, "Floating point exception: Zero divide"},
+               {FPE_INTDIV, "Floating point exception: Zero divide"},
+               {FPE_FLTOVF, "Floating point exception: Overflow"},
+               {FPE_FLTRES, "Floating point exception: Inexact precision"},
+               {FPE_FLTSUB, "Floating point exception: Non-IEEE type"},
+               {SI_USER, "Floating point exception: Non-IEEE type"}};
+  for (const auto& c : cases) {
+    EXPECT_EQ(floatingPointMessage(floatingPointSubCode(c.signalCode)), c.message) << c.signalCode;
+  }
+  EXPECT_EQ(floatingPointMessage(fpe::kDenormalized), "Floating point exception: Denormalized number");
+}
+
+#if defined(__x86_64__) && defined(__GLIBC__)
+TEST(SignalHandlers, TrappedZeroDivideEndsTheRunAndUnderflowDoesNot) {
+  const testing::TemporaryFolder folder;
+  const auto divide = [] {
+    ::feenableexcept(FE_DIVBYZERO);
+    volatile double zero = 0.0;
+    volatile double result = 1.0 / zero;
+    static_cast<void>(result);
+  };
+  EXPECT_EXIT(actWithHandlers(folder, "", "WIN", divide), ::testing::ExitedWithCode(136), "Zero divide");
+
+  const auto underflow = [] {
+    ::feenableexcept(FE_UNDERFLOW);
+    volatile double tiny = 1e-300;
+    volatile double result = tiny * tiny;
+    std::fprintf(stderr, "went on with %g\n", result);
+  };
+  EXPECT_EXIT(actWithHandlers(folder, "", "WIN", underflow), ::testing::ExitedWithCode(0), "went on with 0");
+}
+#endif
+
+TEST(StopRun, TheCompletionLineGoesToATerminationLogThatIsSet) {
+  const testing::TemporaryFolder folder;
+  for (const int exitCode : {0, 1}) {
+    EXPECT_EXIT(actWithHandlers(folder, "", "WIN", [&] { stopRun(exitCode); }), ::testing::ExitedWithCode(exitCode),
+                "");
+    EXPECT_EQ(folder.read("termination.log"), exitCode == 0 ? "Successful completion\n" : "Abnormal completion\n");
+  }
+  const auto without = [] {
+    setTerminationLogUnit(0);
+    stopRun(0);
+  };
+  EXPECT_EXIT(actWithHandlers(folder, "", "WIN", without), ::testing::ExitedWithCode(0), "");
+  EXPECT_EQ(folder.read("termination.log"), "");
+}
+
+}  // namespace
+}  // namespace mirevo
