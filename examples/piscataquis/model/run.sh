@@ -1,0 +1,2 @@
+#!/bin/sh
+exec ./gr4j_cemaneige parameters.txt forcing.csv simulated.csv
