@@ -24,11 +24,13 @@ inline constexpr SearchStatus kSearchOk = 0;
 
 /// What a search has found so far and why it stopped.
 struct SearchSummary {
-  ParameterSet best;                  ///< search scale; empty before the initial sample
+  ParameterSet best;  ///< search scale; empty before the initial sample
   EvaluationResult bestResult;
-  int evaluationCount = 0;            ///< model evaluations made, failed ones included
+  int evaluationCount = 0;  ///< model evaluations made, failed ones included
   int loopCount = 0;
-  std::string terminationMessage;     ///< empty while it runs
+  double populationSpread = 0.0;   ///< search scale; populationSpread() of a search with a population
+  double populationRange = 0.0;    ///< normalisedPopulationRange() of a search with a population
+  std::string terminationMessage;  ///< empty while it runs
 };
 
 /// A search in steps: the step modes -1 (initialise) and 0 (advance) of its caller.

@@ -1,0 +1,50 @@
+#pragma once
+
+#include <cstddef>
+#include <span>
+#include <vector>
+
+#include "algorithms/search_algorithm.h"
+#include "common/parameter_set.h"
+#include "evaluation/evaluation_result.h"
+
+namespace mirevo {
+
+/// An evaluated point of a search: n values on the search scale and what the model made of them.
+struct Individual {
+  ParameterSet set;
+  EvaluationResult result;
+
+  double value() const { return result.aggregate; }
+};
+
+using Population = std::vector<Individual>;
+
+/// Whether objective value `a` is strictly better (smaller) than `b`. Not-a-number is worse than every number.
+bool isBetter(double a, double b);
+
+/// Sorts best first, not-a-number last; individuals of equal value keep their order.
+void sortBestFirst(Population& population);
+
+/// Mean over the n parameters of the population standard deviation (divisor m) of each, on the search scale. With
+/// n < 1 it is 0 divided by n.
+double populationSpread(const Population& population, int parameterCount);
+
+/// Mean over the parameters of (largest − smallest value in the population) / (upper − lower bound). A parameter whose
+/// bounds coincide cannot vary and counts as 0.
+double normalisedPopulationRange(const Population& population, const SearchBounds& bounds);
+
+/// The smallest axis-parallel box that holds the points; n values each.
+struct Box {
+  std::vector<double> lower;
+  std::vector<double> upper;
+};
+Box boundingBox(const Population& population);
+
+/// The centroid of the members at `places` (at least one).
+std::vector<double> centroid(const Population& population, std::span<const std::size_t> places);
+
+/// g + factor·(u − g): with factor −1 the reflection of u through g, with 1/2 the point half-way between them.
+ParameterSet pointOnRay(std::span<const double> g, std::span<const double> u, double factor);
+
+}  // namespace mirevo

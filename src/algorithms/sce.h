@@ -1,0 +1,54 @@
+#pragma once
+
+#include <vector>
+
+#include "algorithms/population_search.h"
+
+namespace mirevo {
+
+/// Shuffled Complex Evolution after Duan, Sorooshian and Gupta (1992), doi:10.1029/91WR02985, and (1993),
+/// doi:10.1007/BF00939380.
+///
+/// The p·m points, sorted best first, are dealt into p complexes of m points: complex k takes ranks k, k + p, k + 2p,
+/// ... Every complex makes the same number of evolution steps on its own, then the complexes are shuffled together. A
+/// step draws q points, better points more often, and moves the worst of them, u, with the centroid g of the others:
+///   reflection 2g − u, taken when better than u (outside the bounds a random point of the complex's box stands in for
+///   it); else contraction (g + u)/2, taken when better than u; else a random point of the complex's box, always taken.
+/// As complexes are independent of each other between two shuffles they advance in step, and the batch of a step holds
+/// the current proposal of every complex. Points, values and random numbers do not depend on how the batch is run.
+class Sce final : public PopulationSearch {
+ public:
+  Sce(const SceSettings& settings, const SimplexSettings& simplex, SearchProblem problem);
+
+ private:
+  /// The points of one complex, best first, and the step that it is making.
+  struct Complex {
+    Population points;
+    std::size_t worst = 0;         ///< place of u, the worst point of the simplex
+    std::vector<double> centroid;  ///< g
+    bool isMoved = false;          ///< whether this step has replaced u
+  };
+  /// A way to propose a point to replace u; the step tries them one after the other.
+  using Proposal = ParameterSet (Sce::*)(const Complex&);
+  enum class Acceptance { whenBetter, always };
+
+  bool areSettingsValid() const override;
+  std::size_t populationSize() const override;
+  void makeLoop() override;
+
+  void dealIntoComplexes();
+  void makeEvolutionStep();
+  void shuffle();
+
+  void drawSubcomplex(Complex& complex);
+  void tryProposals(Proposal propose, Acceptance acceptance);
+  ParameterSet reflection(const Complex& complex);
+  ParameterSet contraction(const Complex& complex);
+  ParameterSet mutation(const Complex& complex);
+
+  SceSettings settings_;
+  SimplexSettings simplex_;
+  std::vector<Complex> complexes_;
+};
+
+}  // namespace mirevo
