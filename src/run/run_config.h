@@ -22,8 +22,8 @@ enum class SimulationOption : std::int32_t {
 enum class AlgorithmType : std::int32_t { sce = 0, pse = 1, dds = 2 };
 
 struct ScenarioConfig {
-  std::int32_t scenarioType = 0;  ///< 0 single run with the initial set, 1 multiple runs
-  std::int32_t runCount = 0;
+  std::int32_t scenarioType = 0;          ///< 0 single run with the initial set, 1 multiple runs
+  std::int32_t runCount = 0;              ///< 1 for a single run
   std::vector<std::vector<double>> runs;  ///< one value a model parameter, model scale
 };
 
@@ -88,8 +88,21 @@ struct RunConfig {
   std::int32_t simultaneousSimulations = 1;
   bool useSingleThread = false;
 
-  /// Model evaluations that the task plans; sizes the failed-run limit and the progress report.
+  /// Model evaluations that the task plans; sizes the failed-run limit and the progress report. 0 where the simulation
+  /// option names no task.
   int plannedEvaluations() const;
+  std::size_t variableParameterCount() const;
 };
+
+/// Where a setup file lies and what the files of its run are named after.
+struct SetupLocation {
+  std::string file;    ///< absolute path
+  std::string folder;  ///< absolute, without a trailing separator
+  std::string name;    ///< file name without the ending ".kdx"
+};
+
+/// The location of a setup file named on the command line; `fileName` may be relative and have blanks behind it. Asks
+/// the system for the current folder only.
+SetupLocation locateSetup(const std::string& fileName);
 
 }  // namespace mirevo
