@@ -1,0 +1,106 @@
+#pragma once
+
+#include <memory>
+#include <string>
+#include <vector>
+
+#include <fmt/format.h>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "common/fatal_error.h"
+#include "common/text.h"
+#include "evaluation/evaluation_observer.h"
+#include "evaluation/local_evaluator.h"
+#include "evaluation/model_run.h"
+#include "temporary_folder.h"
+
+namespace mirevo {
+
+/// Notes what the evaluation loop says, in its order; a finished evaluation as "record N" with its status.
+class RecordingObserver final : public EvaluationObserver {
+ public:
+  void message(std::string_view text) override { events.emplace_back(text); }
+  void warning(std::string_view text) override { events.push_back("warning: " + std::string(text)); }
+  void evaluationFinished(std::span<const double> set, const EvaluationResult& result) override {
+    events.push_back(fmt::format("record {} a={} {}", result.number, set[0], result.ok() ? "OK" : "FAILED"));
+  }
+  bool isCancelled() override { return cancelled; }
+
+  std::vector<std::string> events;
+  bool cancelled = false;
+};
+
+/// A model of one parameter `a` in [0, 10] whose simulated series is the constant a and whose observed one is 1: the
+/// measure is a - 1. Sets with a >= 9 violate a constraint; at a = 5 a dependent parameter has no finite value.
+class EvaluationTest : public testing::Test {
+ protected:
+  EvaluationTest() {
+    folder_.write("base/run.sh", "#!/bin/sh\nexec " MIREVO_TEST_MODEL " --steps 10\n", 0755);
+    folder_.write("base/parameters.tpl", "!\na = !a               !\n");
+    folder_.write("base/parameters.txt", "a = 0\n");
+    folder_.write("base/simulated.csv", series(0.0));
+    folder_.write("observed.csv", series(1.0));
+    description_.baseFolder = folder_ / "base";
+    description_.fileTag = "_tag";
+    description_.parameterFiles = {{0, folder_ / "base/parameters.txt", folder_ / "base/parameters.tpl"}};
+    OutputMeasure measure;
+    measure.name = "bias";
+    measure.simulation = {folder_ / "base/simulated.csv", 1};
+    measure.observation = {folder_ / "observed.csv", 1};
+    description_.measures = {measure};
+    description_.period = {{2001, 1, 1}, {2001, 12, 31}};
+    ObjectiveFunction objective;
+    objective.name = "all";
+    objective.functionType = FunctionType::sumOfAbsolutes;
+    objective.measures = {0};
+    description_.objectives = {objective};
+    settings_.baseFolder = description_.baseFolder;
+    settings_.processFolderPrefix = folder_ / "run_Process";
+    settings_.batchItems = {{folder_ / "base/run.sh", ""}};
+
+    ModelParameter a;
+    a.name = "a";
+    a.initialValue = 2.0;
+    a.upperBound = 10.0;
+    a.idValue = 1.5e-35;
+    ModelParameter dependent;
+    dependent.name = "inverse";
+    dependent.parameterType = ParameterType::dependent;
+    dependent.equation = "1 / (a - 5)";
+    parameters_ =
+        std::make_unique<ParameterModel>(std::vector{a, dependent}, std::vector<InternalConstraint>{{"a", "9", 0}});
+  }
+
+  /// Five daily values from 2001-01-01 on.
+  static std::string series(double value) {
+    std::string text = "time,flow\n";
+    for (int day = 1; day <= 5; ++day) text += fmt::format("2001-01-{:02},{}\n", day, value);
+    return text;
+  }
+
+  void makeRunner(ProcessLauncher& launcher, int slotCount) {
+    settings_.slotCount = slotCount;
+    aggregator_ = std::make_unique<ObjectiveAggregator>(description_.objectives, method_);
+    runner_ = std::make_unique<ModelRunner>(description_, *parameters_, *aggregator_, launcher, settings_);
+  }
+  LocalEvaluator& makeEvaluator(ProcessLauncher& launcher, int slotCount, int planned) {
+    makeRunner(launcher, slotCount);
+    failedRuns_ = std::make_unique<FailedRunPolicy>(planned);
+    evaluator_ = std::make_unique<LocalEvaluator>(*runner_, observer_, *failedRuns_, slotCount);
+    return *evaluator_;
+  }
+
+  TemporaryFolder folder_;
+  ModelDescription description_;
+  LauncherSettings settings_;
+  AggregationMethod method_ = AggregationMethod::none;
+  RecordingObserver observer_;
+  std::unique_ptr<ParameterModel> parameters_;
+  std::unique_ptr<ObjectiveAggregator> aggregator_;
+  std::unique_ptr<ModelRunner> runner_;
+  std::unique_ptr<FailedRunPolicy> failedRuns_;
+  std::unique_ptr<LocalEvaluator> evaluator_;
+};
+
+}  // namespace mirevo

@@ -1,0 +1,182 @@
+#include "evaluation/local_evaluator.h"
+
+#include "evaluation/evaluation_fixture.h"
+#include "evaluation/fake_launcher.h"
+#include "platform/posix_process_launcher.h"
+
+namespace mirevo {
+namespace {
+
+using testing::ElementsAre;
+using testing::HasSubstr;
+
+class LocalEvaluatorTest : public EvaluationTest {
+ protected:
+  /// A batch of that length that computes the series from the parameter file, as the model does.
+  FakeLauncher::Batch computes(double seconds) const {
+    FakeLauncher::Batch batch;
+    batch.seconds = seconds;
+    batch.write = [](const std::string& folder) {
+      std::ifstream input(folder + "/parameters.txt");
+      std::string name, equals;
+      double a = 0.0;
+      input >> name >> equals >> a;
+      std::ofstream(folder + "/simulated.csv") << series(a);
+    };
+    return batch;
+  }
+  static FakeLauncher::Batch fails(double seconds) {
+    FakeLauncher::Batch batch;
+    batch.seconds = seconds;
+    batch.failure = {BatchFailure::Kind::exitCode, 3, "run.sh exited with code 3"};
+    batch.output = {"reading", "no convergence"};
+    return batch;
+  }
+  static std::vector<double> measuresOf(const std::vector<EvaluationResult>& results) {
+    std::vector<double> values;
+    for (const EvaluationResult& result : results) values.push_back(result.measureValues.at(0));
+    return values;
+  }
+};
+
+TEST_F(LocalEvaluatorTest, OneSlotRunsOneSetAfterAnother) {
+  FakeLauncher launcher([&](int, const std::string&) { return computes(20.0); });
+  LocalEvaluator& evaluator = makeEvaluator(launcher, 1, 100);
+  const auto results = evaluator.evaluateParameterSets(std::vector<ParameterSet>{{2.0}, {4.0}}, DispatchMode::task);
+  EXPECT_THAT(measuresOf(results), ElementsAre(1.0, 3.0));
+  EXPECT_THAT(observer_.events, ElementsAre("Evaluation of parameter set No. 1 initiated",
+                                            "Evaluation of parameter set No. 1 completed: OK", "record 1 a=2 OK",
+                                            "Evaluation of parameter set No. 2 initiated",
+                                            "Evaluation of parameter set No. 2 completed: OK", "record 2 a=4 OK"));
+  EXPECT_DOUBLE_EQ(launcher.now, 40.0);  // no wait goes on after a batch has ended
+  EXPECT_DOUBLE_EQ(launcher.longestWait, 3.0);
+}
+
+TEST_F(LocalEvaluatorTest, ResultsStandInTheOrderOfTheSetsWhateverEndsFirst) {
+  const std::vector<double> seconds = {5.0, 1.0, 3.0, 1.5, 1.0, 0.0, 2.0};
+  FakeLauncher launcher(
+      [&](int start, const std::string&) { return computes(seconds.at(static_cast<std::size_t>(start - 1))); });
+  LocalEvaluator& evaluator = makeEvaluator(launcher, 3, 100);
+  std::vector<ParameterSet> sets;
+  for (int i = 0; i < 6; ++i) sets.push_back({0.5 * i});
+  const auto results = evaluator.evaluateParameterSets(sets, DispatchMode::task);
+  EXPECT_THAT(measuresOf(results), ElementsAre(-1.0, -0.5, 0.0, 0.5, 1.0, 1.5));
+  EXPECT_EQ(launcher.mostRunning, 3);
+  EXPECT_DOUBLE_EQ(launcher.now, 5.0);  // a freed slot is filled at once
+  std::vector<std::string> records;
+  for (const std::string& event : observer_.events) {
+    if (event.starts_with("record")) records.push_back(event.substr(0, 8));
+  }
+  EXPECT_THAT(records, ElementsAre("record 2", "record 4", "record 3", "record 6", "record 5", "record 1"));
+
+  // Sets are numbered through the run, not the batch.
+  const auto second =
+      evaluator.evaluateParameterSets(std::vector<ParameterSet>{{3.0}}, DispatchMode::surrogateSelected);
+  EXPECT_EQ(second.at(0).number, 7);
+}
+
+TEST_F(LocalEvaluatorTest, AFailedRunHasTheFailedValueEverywhereAndTheRestGoesOn) {
+  FakeLauncher launcher([&](int start, const std::string&) { return start == 2 ? fails(1.0) : computes(1.0); });
+  LocalEvaluator& evaluator = makeEvaluator(launcher, 1, 10);
+  const auto results =
+      evaluator.evaluateParameterSets(std::vector<ParameterSet>{{2.0}, {3.0}, {4.0}}, DispatchMode::task);
+  EXPECT_THAT(measuresOf(results), ElementsAre(1.0, kFailedRunValue, 3.0));
+  EXPECT_THAT(results[1].objectiveValues, ElementsAre(kFailedRunValue));
+  EXPECT_EQ(results[1].aggregate, kFailedRunValue);
+  EXPECT_EQ(results[1].failure->reason, "run.sh exited with code 3");
+  EXPECT_THAT(results[1].failure->lastOutput, ElementsAre("reading", "no convergence"));
+  EXPECT_THAT(observer_.events,
+              testing::Contains("Evaluation of parameter set No. 2 completed: FAILED - model run error"));
+}
+
+TEST_F(LocalEvaluatorTest, TheFailureAfterTheLimitEndsTheRunOnceItIsOnRecord) {
+  const struct {
+    int planned;
+    int fatalFailure;
+  } cases[] = {{1, 1}, {9, 1}, {10, 2}, {25, 3}};
+  for (const auto& c : cases) {
+    observer_.events.clear();
+    FakeLauncher launcher([&](int, const std::string&) { return fails(1.0); });
+    LocalEvaluator& evaluator = makeEvaluator(launcher, 1, c.planned);
+    try {
+      evaluator.evaluateParameterSets(std::vector<ParameterSet>(5, {2.0}), DispatchMode::task);
+      FAIL();
+    } catch (const FatalError& error) {
+      EXPECT_EQ(error.message(), "Error: Unable to continue. No of failed simulations too high.");
+      EXPECT_EQ(error.detail(),
+                fmt::format("failed evaluations: {}; at most {} may fail, a tenth of the {} planned\n"
+                            "the last of them, No. {}: run.sh exited with code 3\n| reading\n| no convergence",
+                            c.fatalFailure, c.planned / 10, c.planned, c.fatalFailure));
+      EXPECT_EQ(observer_.events.back(), fmt::format("record {} a=2 FAILED", c.fatalFailure));
+      EXPECT_EQ(launcher.starts, c.fatalFailure);
+    }
+  }
+}
+
+TEST_F(LocalEvaluatorTest, SetsThatCannotBeRunAreNotStarted) {
+  FakeLauncher launcher([&](int, const std::string&) { return computes(1.0); });
+  LocalEvaluator& evaluator = makeEvaluator(launcher, 1, 100);
+  const auto results =
+      evaluator.evaluateParameterSets(std::vector<ParameterSet>{{9.5}, {5.0}, {2.0}}, DispatchMode::task);
+  EXPECT_EQ(launcher.starts, 1);
+  EXPECT_THAT(
+      observer_.events,
+      ElementsAre("Evaluation of parameter set No. 1 completed: FAILED - parameter constraints violated",
+                  "record 1 a=9.5 FAILED", "Evaluation of parameter set No. 2 completed: FAILED - model run error",
+                  "record 2 a=5 FAILED", "Evaluation of parameter set No. 3 initiated",
+                  "Evaluation of parameter set No. 3 completed: OK", "record 3 a=2 OK"));
+  EXPECT_EQ(results[0].failure->kind, EvaluationFailure::Kind::constraintsViolated);
+  EXPECT_THAT(results[1].failure->reason, HasSubstr("inverse"));
+  EXPECT_EQ(failedRuns_->failedCount(), 2);
+}
+
+TEST_F(LocalEvaluatorTest, CancellationHaltsWhatRunsAndStartsNothing) {
+  FakeLauncher launcher([&](int, const std::string&) { return computes(100.0); });
+  launcher.onWait = [&] { observer_.cancelled = launcher.now >= 6.0; };
+  LocalEvaluator& evaluator = makeEvaluator(launcher, 2, 100);
+  const std::vector<ParameterSet> sets(4, {2.0});
+  EXPECT_THROW(evaluator.evaluateParameterSets(sets, DispatchMode::task), RunCancelled);
+  EXPECT_DOUBLE_EQ(launcher.now, 6.0);
+  EXPECT_EQ(launcher.halts, 1);
+  EXPECT_EQ(launcher.starts, 2);
+  EXPECT_EQ(observer_.events.back(), "Simulation cancelled");
+  EXPECT_THROW(evaluator.evaluateParameterSets(sets, DispatchMode::task), RunCancelled);
+  EXPECT_EQ(launcher.starts, 2);
+}
+
+TEST_F(LocalEvaluatorTest, WarnsOfProcessesLeftBehind) {
+  FakeLauncher launcher([&](int, const std::string&) {
+    FakeLauncher::Batch batch = computes(1.0);
+    batch.leftBehind = "run.sh left a process running";
+    return batch;
+  });
+  makeEvaluator(launcher, 1, 10).evaluateParameterSets(std::vector<ParameterSet>{{2.0}}, DispatchMode::task);
+  EXPECT_EQ(observer_.events.at(1), "warning: Evaluation of parameter set No. 1: run.sh left a process running");
+}
+
+TEST_F(LocalEvaluatorTest, SettlesTheTransformationFromTheSampleWithoutItsFailures) {
+  method_ = AggregationMethod::commonProbability;
+  FakeLauncher launcher([&](int start, const std::string&) { return start == 2 ? fails(1.0) : computes(1.0); });
+  LocalEvaluator& evaluator = makeEvaluator(launcher, 1, 100);
+  auto sample = evaluator.evaluateParameterSets(std::vector<ParameterSet>{{2.0}, {3.0}, {4.0}}, DispatchMode::task);
+  EXPECT_TRUE(std::isnan(sample[0].aggregate));
+  evaluator.settleAggregates(sample);
+  // Objective values 1 and 3: mean 2, standard deviation √2, so the aggregates are Φ(∓1/√2).
+  EXPECT_NEAR(sample[0].aggregate, 0.23975006109347674, 1e-12);
+  EXPECT_NEAR(sample[2].aggregate, 0.7602499389065233, 1e-12);
+  EXPECT_EQ(sample[1].aggregate, kFailedRunValue);
+}
+
+TEST_F(LocalEvaluatorTest, RunsRealProcesses) {
+  PosixProcessLauncher launcher;
+  LocalEvaluator& evaluator = makeEvaluator(launcher, 2, 100);
+  std::vector<ParameterSet> sets;
+  for (int i = 0; i < 8; ++i) sets.push_back({0.25 * i});
+  const auto results = evaluator.evaluateParameterSets(sets, DispatchMode::task);
+  EXPECT_THAT(measuresOf(results), ElementsAre(-1.0, -0.75, -0.5, -0.25, 0.0, 0.25, 0.5, 0.75));
+  EXPECT_EQ(folder_.read("base/parameters.txt"), "a = 0\n");
+  EXPECT_EQ(folder_.read("base/simulated.csv"), series(0.0));
+}
+
+}  // namespace
+}  // namespace mirevo

@@ -1,0 +1,205 @@
+#include "evaluation/model_run.h"
+
+#include "evaluation/evaluation_fixture.h"
+#include "evaluation/fake_launcher.h"
+
+namespace mirevo {
+namespace {
+
+using testing::ElementsAre;
+using testing::HasSubstr;
+using Kind = EvaluationFailure::Kind;
+
+class ModelRunTest : public EvaluationTest {
+ protected:
+  ModelRunTest() : launcher_([this](int, const std::string&) { return batch_; }) {}
+
+  EvaluationResult evaluate(double a) {
+    const std::vector<double> set = {a};
+    EXPECT_FALSE(runner_->prepareModelRun(set, 1).has_value());
+    launcher_.now += batch_.seconds;
+    std::int32_t executing = 1;
+    std::int32_t status = 0;
+    launcher_.isExecuting(1, executing, status);
+    EXPECT_EQ(executing, 0);
+    return runner_->collect(1);
+  }
+  void writes(const std::string& name, const std::string& content) {
+    batch_.write = [name, content](const std::string& folder) { std::ofstream(folder + "/" + name) << content; };
+  }
+  /// The message of the FatalError that making the runner ends in.
+  std::string refusal() {
+    try {
+      makeRunner(launcher_, 1);
+      return "none";
+    } catch (const FatalError& error) {
+      return error.message() + "\n" + error.detail();
+    }
+  }
+
+  FakeLauncher::Batch batch_;
+  FakeLauncher launcher_;
+};
+
+TEST_F(ModelRunTest, WhatAModelMayDoWrongIsAFailedEvaluationWithItsReason) {
+  const std::string file = folder_ / "run_Process1/simulated.csv";
+  const struct {
+    const char* name;
+    std::string content;  ///< of simulated.csv; "-" writes none
+    Kind kind;
+    std::string reason;
+  } cases[] = {
+      {"nothing", "-", Kind::resultsNotWritten, "the batch ended well but did not write " + file},
+      {"empty file", "", Kind::resultsNotReadable, file},
+      {"header alone", "time,flow\n", Kind::resultsNotReadable, file + ": expected at least one time step, found none"},
+      {"cut line", "time,flow\n2001-01-01,1\n2001-01-0", Kind::resultsNotReadable, file + ":3"},
+      {"all missing", series(std::nan("")), Kind::resultsNotReadable, file + ": item No. 1 (flow) has missing values"},
+      {"item gone", "time\n2001-01-01\n", Kind::resultsNotReadable, file},
+      {"overflow", series(1e30), Kind::resultNotFinite, "output measure \"bias\" is Inf"},
+  };
+  description_.measures[0].statisticType = StatisticType::rootMeanSquare;  // squares 1e30 in 32 bits
+  makeRunner(launcher_, 1);
+  batch_.output = {"last words"};
+  for (const auto& c : cases) {
+    batch_.write = nullptr;
+    if (c.content != "-") writes("simulated.csv", c.content);
+    const EvaluationResult result = evaluate(2.0);
+    ASSERT_FALSE(result.ok()) << c.name;
+    EXPECT_EQ(result.failure->kind, c.kind) << c.name;
+    EXPECT_THAT(result.failure->reason, testing::StartsWith(c.reason)) << c.name;
+    EXPECT_THAT(result.failure->lastOutput, ElementsAre("last words"));
+    EXPECT_THAT(result.measureValues, ElementsAre(kFailedRunValue)) << c.name;
+    EXPECT_THAT(result.objectiveValues, ElementsAre(kFailedRunValue)) << c.name;
+    // A good run in the same slot follows; then the next case must not find its results.
+    writes("simulated.csv", series(4.0));
+    EXPECT_THAT(evaluate(2.0).measureValues, ElementsAre(3.0)) << c.name;
+  }
+}
+
+TEST_F(ModelRunTest, BatchFailuresKeepTheirKind) {
+  makeRunner(launcher_, 1);
+  writes("simulated.csv", series(4.0));  // results beside a failure do not count
+  const struct {
+    BatchFailure::Kind batch;
+    Kind kind;
+  } cases[] = {{BatchFailure::Kind::exitCode, Kind::exitCode},
+               {BatchFailure::Kind::signal, Kind::signal},
+               {BatchFailure::Kind::couldNotStart, Kind::couldNotStart}};
+  for (const auto& c : cases) {
+    batch_.failure = {c.batch, 1, "why"};
+    const EvaluationResult result = evaluate(2.0);
+    ASSERT_FALSE(result.ok());
+    EXPECT_EQ(result.failure->kind, c.kind);
+    EXPECT_EQ(result.failure->reason, "why");
+  }
+}
+
+TEST_F(ModelRunTest, MeasureFileValuesAreTakenByTheirNumber) {
+  description_.measures[0].interfaceType = InterfaceType::measureFile;
+  description_.measures[0].measurementNo = 2;
+  description_.measureFile = folder_ / "base/out/measures.txt";
+  folder_.write("base/out/keep", "");
+  makeRunner(launcher_, 1);
+  const std::string file = folder_ / "run_Process1/out/measures.txt";
+  const struct {
+    std::string content;
+    std::string reason;
+  } cases[] = {{"7 8.5 # rms and bias", ""},
+               {"7\n", file + ": expected at least 2 numbers, found 1"},
+               {"7\n8.x\n", file + ":2"},
+               {"", file + ": expected at least 2 numbers, found 0"}};
+  for (const auto& c : cases) {
+    writes("out/measures.txt", c.content);
+    const EvaluationResult result = evaluate(2.0);
+    EXPECT_EQ(result.ok(), c.reason.empty()) << c.content;
+    if (result.ok()) {
+      EXPECT_THAT(result.measureValues, ElementsAre(8.5));
+    } else {
+      EXPECT_EQ(result.failure->kind, Kind::resultsNotReadable);
+      EXPECT_THAT(result.failure->reason, testing::StartsWith(c.reason));
+    }
+  }
+  batch_.write = nullptr;
+  EXPECT_EQ(evaluate(2.0).failure->reason, "the batch ended well but did not write " + file);
+}
+
+TEST_F(ModelRunTest, MeasuresThatCannotBeComputedEndTheRunNamingTheSlotsFile) {
+  description_.period = {{1999, 1, 1}, {1999, 12, 31}};
+  makeRunner(launcher_, 1);
+  writes("simulated.csv", series(4.0));
+  try {
+    evaluate(2.0);
+    FAIL();
+  } catch (const FatalError& error) {
+    EXPECT_EQ(error.message(), "Error: No simulated data found at observation times for item No. 1 in " +
+                                   (folder_ / "base/simulated.csv"));
+    EXPECT_THAT(error.detail(), HasSubstr("read from " + (folder_ / "run_Process1/simulated.csv")));
+  }
+}
+
+TEST_F(ModelRunTest, NumericIdTemplatesAreConvertedIntoTheSlotsAlone) {
+  folder_.write("base/parameters.tpl", "a = 1.5E-035\n");
+  description_.parameterFiles[0].fileType = kNumericIdTemplate;
+  makeRunner(launcher_, 2);
+  writes("simulated.csv", series(4.0));
+  EXPECT_TRUE(evaluate(2.5).ok());
+  EXPECT_EQ(folder_.read("run_Process1/parameters.txt"), "a =         2.5\n");
+  EXPECT_EQ(folder_.read("run_Process2/parameters.tpl_tag.tpl"), "!\na = !a        !\n");
+  EXPECT_FALSE(folder_.exists("base/parameters.tpl_tag.tpl"));
+  EXPECT_EQ(folder_.read("base/parameters.txt"), "a = 0\n");
+}
+
+TEST_F(ModelRunTest, CrossSectionFilesHaveTheirResistanceNumbersUpdated) {
+  folder_.write("base/river.QCSR", "");
+  description_.parameterFiles.push_back({0, folder_ / "base/river.QCSR", folder_ / "base/parameters.tpl"});
+  makeRunner(launcher_, 1);
+  writes("simulated.csv", series(4.0));
+  EXPECT_TRUE(evaluate(2.0).ok());
+  EXPECT_THAT(launcher_.resistanceFiles, ElementsAre(folder_ / "run_Process1/river.QCSR"));
+
+  const std::pair<ResistanceUpdate, const char*> texts[] = {
+      {ResistanceUpdate::functionNotFound, "Function \"R35UpdateResistanceNumbers\" not found in DLL"},
+      {ResistanceUpdate::libraryNotFound, "DLL \"ProfileTool.dll\" not found"},
+      {ResistanceUpdate::writeError, "Error writing the .qcs cross section file"},
+      {ResistanceUpdate::readError, "Error reading the .qcs cross section file"},
+      {ResistanceUpdate::documentCreationFailed, "Creation of document object failed"},
+      {ResistanceUpdate::noReadAccess, "Read access to the .qcs cross section file not found"},
+      {ResistanceUpdate::wrongExtension, "File extension \".qcsr\" is expected"},
+  };
+  for (const auto& [outcome, text] : texts) {
+    launcher_.resistanceUpdate = outcome;
+    try {
+      runner_->prepareModelRun(std::vector<double>{2.0}, 1);
+      FAIL() << text;
+    } catch (const FatalError& error) {
+      EXPECT_EQ(error.message(), std::string("Error updating resistance numbers: ") + text);
+    }
+  }
+}
+
+TEST_F(ModelRunTest, WhatCannotWorkIsRefusedBeforeAModelRuns) {
+  const ModelDescription good = description_;
+  const std::string lie = "expected a file in " + good.baseFolder +
+                          " or below it, the folder of the first batch file, which every slot has a copy of";
+
+  description_.parameterFiles[0].templateFileName = folder_ / "base/missing.tpl";
+  EXPECT_EQ(refusal(),
+            "Error: Unable to open template file " + (folder_ / "base/missing.tpl") + "\nNo such file or directory");
+  description_.parameterFiles[0].fileType = kNumericIdTemplate;
+  EXPECT_EQ(refusal(), "Error: Unable to open " + (folder_ / "base/missing.tpl") + "\nNo such file or directory");
+  description_ = good;
+  description_.measures[0].simulation.fileName = folder_ / "base_other/simulated.csv";
+  EXPECT_EQ(refusal(), "Error: The file " + (folder_ / "base_other/simulated.csv") +
+                           " does not lie in the model's folder\n" + lie);
+  description_ = good;
+  description_.measures[0].observation.fileName = folder_ / "missing.csv";
+  EXPECT_THAT(refusal(), testing::StartsWith("Error opening TS object for file: " + (folder_ / "missing.csv")));
+  EXPECT_FALSE(folder_.exists("run_Process1"));
+  description_ = good;
+  launcher_.initialiseError = "Unable to create the folder /x: Permission denied";
+  EXPECT_EQ(refusal(),
+            "Error: Unable to initialise MirevoSimpleLaunch\nUnable to create the folder /x: Permission denied");
+}
+
+}  // namespace
+}  // namespace mirevo
