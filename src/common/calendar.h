@@ -41,8 +41,8 @@ constexpr std::int64_t dayNumber(std::int64_t year, int month, int day) {
 /// Seconds since 0000-03-01 00:00 of a valid date; 24:00 is the next day's 00:00 and minute 60 the next hour's start.
 constexpr std::int64_t secondNumber(const DateRecord& date) {
   using namespace date_field;
-  return dayNumber(date[kYear], date[kMonth], date[kDay]) * 86400 + date[kHour] * 3600 + date[kMinute] * 60 +
-         date[kSecond];
+  const std::int64_t hours = dayNumber(date[kYear], date[kMonth], date[kDay]) * 24 + date[kHour];
+  return (hours * 60 + date[kMinute]) * 60 + date[kSecond];
 }
 
 /// The inverse of secondNumber(), with an hour of 0 to 23.

@@ -17,7 +17,7 @@ std::int64_t monthKey(const DateRecord& date) {
 }
 
 std::int64_t minuteKey(const DateRecord& date) {
-  return std::int64_t{date[kDay]} * 10000 + date[kHour] * 100 + date[kMinute];
+  return std::int64_t{date[kDay]} * 10000 + std::int64_t{date[kHour]} * 100 + date[kMinute];
 }
 
 bool isLater(const DateRecord& a, const DateRecord& b) {

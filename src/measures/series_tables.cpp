@@ -2,6 +2,9 @@
 
 #include <algorithm>
 #include <cassert>
+#include <utility>
+
+#include <fmt/format.h>
 
 #include "common/fatal_error.h"
 #include "common/text.h"
@@ -97,7 +100,7 @@ std::optional<std::string> SeriesTables::tryOpenSimulationFiles(std::span<const 
     std::unique_ptr<TimeSeriesObject> series = createTimeSeriesObject(path, reason);
     std::optional<std::string> unusable;
     if (!series) {
-      unusable = path + ": " + reason;
+      unusable = fmt::format("{}: {}", path, reason);
     } else if (!series->open(path)) {
       unusable = series->lastError();
     } else {

@@ -78,7 +78,7 @@ std::optional<std::int64_t> DateScanner::scan(const char*& at, const char* end) 
     if (second > 59) return std::nullopt;
     at = date + kSecondsLength;
   }
-  return *day + hour * 3600 + minute * 60 + second;
+  return *day + (std::int64_t{hour} * 60 + minute) * 60 + second;
 }
 
 std::optional<std::int64_t> DateScanner::scanCell(const char*& at, const char* end) {
