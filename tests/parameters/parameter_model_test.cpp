@@ -68,6 +68,7 @@ std::vector<int> orderStepByStep(const std::vector<std::vector<std::size_t>>& na
     }
   }
   std::vector<int> result;
+  result.reserve(order.size());
   for (const std::size_t i : order) result.push_back(static_cast<int>(i) + 1);
   return result;
 }
