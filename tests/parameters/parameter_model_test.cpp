@@ -1,6 +1,7 @@
 #include "parameters/parameter_model.h"
 
 #include <algorithm>
+#include <cmath>
 #include <random>
 
 #include <gmock/gmock.h>

@@ -102,6 +102,10 @@ TEST(ConvertIdTemplate, KeepsLinesAndEndsThemAlike) {
   EXPECT_EQ(ConvertIdTemplate("t", std::string(50000, 'x') + "   ", parameters()).size(), 50003);
   EXPECT_EQ(refused([] { ConvertIdTemplate("t", "a\n" + std::string(50001, 'x'), parameters()); }).message(),
             "Error: Line 2 of template file t is too long");
+  std::string many;
+  for (int i = 0; i < 5000; ++i) many += " 1e-35";
+  EXPECT_EQ(refused([&] { ConvertIdTemplate("t", many, parameters()); }).message(),
+            "Error: Line 1 of template file t is too long");
 }
 
 TEST(ParameterTemplate, FillsPlaceholders) {
