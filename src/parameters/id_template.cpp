@@ -88,6 +88,7 @@ std::string convertLine(std::string_view templateName, std::size_t lineNumber, s
     placeholder += kConvertedDelimiter;
     const std::size_t from = s + 1;
     line.replace(from, end - from, placeholder);
+    if (line.size() > kMaximumLineLength) failLongLine(templateName, lineNumber, line.size());
     searched.replace(from, end - from, std::string(placeholder.size(), kConvertedDelimiter));
   }
   return line;

@@ -133,10 +133,14 @@ std::vector<std::string> ParameterTemplate::narrowPlaceholderWarnings(
     }
     const std::string& before = pieces_[i];
     const std::string& after = pieces_[i + 1];
-    // Two placeholders side by side touch only where the second fills its field, which its own width tells.
-    if ((!before.empty() && isDigit(before.back())) || (!after.empty() && isDigit(after.front()))) {
-      warnings.push_back(
-          where + " is touched by a digit, so that the model may read one number of both: put a blank between them");
+    const bool touchedBefore = !before.empty() && (isDigit(before.back()) || before.ends_with('.') ||
+                                                   before.ends_with('+') || before.ends_with('-'));
+    const bool touchedAfter = !after.empty() && isDigit(after.front());
+    if (touchedBefore || touchedAfter) {
+      warnings.push_back(where +
+                         fmt::format(" is touched by \"{}\", which the model may read as a part of its value: put "
+                                     "a blank between them",
+                                     touchedBefore ? before.back() : after.front()));
     }
   }
   return warnings;

@@ -43,7 +43,8 @@ class ParameterTemplate final {
   std::vector<std::size_t> parametersNamed() const;
 
   /// One warning a placeholder in which values between the parameter's bounds keep fewer than four significant digits,
-  /// with the width to use; and one a placeholder that a digit touches, so that the model reads one number of both.
+  /// with the width to use; and one a placeholder that a digit or a sign touches, as the model may read one number of
+  /// both.
   std::vector<std::string> narrowPlaceholderWarnings(std::span<const ModelParameter> parameters) const;
 
  private:

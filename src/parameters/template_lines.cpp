@@ -13,14 +13,17 @@ std::string_view trimBlanks(std::string_view text) {
   return last == std::string_view::npos ? std::string_view{} : text.substr(0, last + 1);
 }
 
+void failLongLine(std::string_view templateName, std::size_t lineNumber, std::size_t length) {
+  fatalError(fmt::format("Error: Line {} of template file {} is too long", lineNumber, templateName),
+             fmt::format("it has {} characters; a line may have {}, the names of its placeholders included", length,
+                         kMaximumLineLength));
+}
+
 std::vector<std::string_view> templateLines(std::string_view templateName, std::string_view text) {
   std::vector<std::string_view> lines = splitLines(text);
   for (std::size_t i = 0; i < lines.size(); ++i) {
     lines[i] = trimBlanks(lines[i]);
-    if (lines[i].size() > kMaximumLineLength) {
-      fatalError(fmt::format("Error: Line {} of template file {} is too long", i + 1, templateName),
-                 fmt::format("it has {} characters; a line may have {}", lines[i].size(), kMaximumLineLength));
-    }
+    if (lines[i].size() > kMaximumLineLength) failLongLine(templateName, i + 1, lines[i].size());
   }
   return lines;
 }

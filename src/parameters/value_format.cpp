@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <cstdint>
 #include <optional>
 
 #include <fmt/format.h>
@@ -25,9 +26,9 @@ void trimZeros(std::string& text) {
 /// The value with as many decimals as 20 characters hold, always with its decimal point, without trailing zeros and
 /// without a trailing point; nothing when the digits before the point do not fit.
 std::optional<std::string> fixedForm(double value, int width) {
-  // The integer part with its sign, before rounding; rounding may add one digit.
-  int integerWidth = (value < 0 ? 1 : 0) + 1;
-  for (double rest = std::abs(value); rest >= 10.0; rest /= 10.0) ++integerWidth;
+  // Below 1e19 the digits before the point fit 64 bits; rounding may add one.
+  const std::size_t digits = std::to_string(static_cast<std::uint64_t>(std::abs(value))).size();
+  const int integerWidth = static_cast<int>(digits) + (value < 0 ? 1 : 0);
   int decimals = std::max(0, kMaximumValueWidth - integerWidth - 1);
   std::string text = fmt::format("{:#.{}f}", value, decimals);
   while (static_cast<int>(text.size()) > kMaximumValueWidth && decimals > 0) {

@@ -1,6 +1,7 @@
 #include "parameters/parameter_model.h"
 
 #include <algorithm>
+#include <cmath>
 #include <random>
 
 #include <gmock/gmock.h>
@@ -68,6 +69,7 @@ std::vector<int> orderStepByStep(const std::vector<std::vector<std::size_t>>& na
     }
   }
   std::vector<int> result;
+  result.reserve(order.size());
   for (const std::size_t i : order) result.push_back(static_cast<int>(i) + 1);
   return result;
 }
