@@ -60,6 +60,7 @@ std::string columnName(std::string_view name) {
 
 void ResultFile::open(const std::string& path, std::span<const std::string> headLines, const ResultColumns& columns) {
   rows_.clear();
+  aggregates_.clear();
   file_.open(path);
   std::string head = commentLines(headLines);
   head += "Evaluation\tStatus";
@@ -90,13 +91,25 @@ bool ResultFile::isInOrder() const {
 bool ResultFile::finish(std::span<const std::string> closingLines, std::string& reason) {
   if (!file_.isOpen()) return true;
   const std::string closing = commentLines(closingLines);
-  bool finished = isInOrder() ? file_.tryAppend(closing, reason) : rewriteInOrder(closing, reason);
-  if (!finished && !isInOrder()) {
+  const bool isComplete = isInOrder() && aggregates_.empty();
+  bool finished = isComplete ? file_.tryAppend(closing, reason) : rewriteInOrder(closing, reason);
+  if (!finished && !isComplete) {
     std::string again;
     file_.tryAppend(closing, again);  // better out of order than without its end
   }
   file_.close();
   return finished;
+}
+
+void ResultFile::appendRow(std::string& text, std::string_view content, const Row& row) const {
+  std::string_view line = content.substr(static_cast<std::size_t>(row.offset), static_cast<std::size_t>(row.length));
+  const auto aggregate = aggregates_.find(row.number);
+  if (aggregate == aggregates_.end()) {
+    text += line;
+  } else {
+    text += line.substr(0, line.rfind('\t') + 1);
+    text += formatReal(aggregate->second) + '\n';
+  }
 }
 
 bool ResultFile::rewriteInOrder(std::string_view closing, std::string& reason) const {
@@ -111,9 +124,7 @@ bool ResultFile::rewriteInOrder(std::string_view closing, std::string& reason) c
   std::string sorted;
   sorted.reserve(content->size() + closing.size());
   sorted.append(*content, 0, static_cast<std::size_t>(headLength_));
-  for (const Row& row : ordered) {
-    sorted.append(*content, static_cast<std::size_t>(row.offset), static_cast<std::size_t>(row.length));
-  }
+  for (const Row& row : ordered) appendRow(sorted, *content, row);
   sorted += closing;
   // Written beside it and renamed, so that there is no moment at which a row is nowhere.
   const std::string temporary = path() + ".tmp";

@@ -1,8 +1,10 @@
 #pragma once
 
 #include <cstdint>
+#include <map>
 #include <span>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "evaluation/evaluation_result.h"
@@ -28,6 +30,9 @@ class ResultFile final {
   /// One evaluation: `parameterValues` on the model scale, one a column. Throws FatalError when it cannot be written.
   void addRow(std::span<const double> parameterValues, const EvaluationResult& result);
 
+  /// Gives a row another aggregate than it was written with; takes effect on disk with finish().
+  void replaceAggregate(int number, double aggregate) { aggregates_[number] = aggregate; }
+
   /// Brings the rows into the order of their numbers and writes the closing lines (without "# "). False, with the
   /// system's reason, when that fails; what was written before is then still there. Nothing happens to a file that is
   /// not open.
@@ -43,11 +48,13 @@ class ResultFile final {
     std::int64_t length;
   };
   bool isInOrder() const;
+  void appendRow(std::string& text, std::string_view content, const Row& row) const;
   bool rewriteInOrder(std::string_view closing, std::string& reason) const;
 
   RecordFile file_;
   std::int64_t headLength_ = 0;
   std::vector<Row> rows_;
+  std::map<int, double> aggregates_;  ///< by row number
 };
 
 /// A name as a column's heading: nothing in it that a reader of tab-separated values takes for something else.

@@ -1,5 +1,7 @@
 #include "run/run_reporter.h"
 
+#include <cmath>
+
 #include <fmt/format.h>
 
 #include "common/fatal_error.h"
@@ -19,7 +21,7 @@ void RunReporter::warning(std::string_view text) {
 }
 
 void RunReporter::evaluationFinished(std::span<const double> set, const EvaluationResult& result) {
-  std::vector<double> values = ToModelScale(space_, set);
+  const std::vector<double> values = ToModelScale(space_, set);
   results_.addRow(values, result);
   ++evaluationCount_;
   state_.objectiveValues = result.objectiveValues;
@@ -28,14 +30,31 @@ void RunReporter::evaluationFinished(std::span<const double> set, const Evaluati
     lastFailureReason_ = result.failure->reason;
     failedRuns_.add(values, result);
     state_.log.line(fmt::format("   Evaluation No. {}: {}", result.number, lastFailureReason_));
-  } else if (!result.objectiveValues.empty() && (!best_ || result.aggregate < best_->aggregate)) {
-    // A NaN, while the objective transformation is not settled, is never the best.
-    if (result.aggregate == result.aggregate) best_ = Best{result.number, result.aggregate, std::move(values)};
+  } else if (std::isnan(result.aggregate)) {
+    unsettled_.push_back({result.number, values, result.objectiveValues});
+  } else if (!result.objectiveValues.empty()) {
+    considerAsBest(result.number, result.aggregate, values);
   }
   state_.progress.progressStep();
   if (!state_.log.writeError().empty()) {
     fatalError("Error: Unable to write to " + state_.log.path(), state_.log.writeError());
   }
+}
+
+void RunReporter::considerAsBest(int number, double aggregate, const std::vector<double>& parameterValues) {
+  const bool isBetter =
+      !best_ || aggregate < best_->aggregate || (aggregate == best_->aggregate && number < best_->number);
+  if (isBetter) best_ = Best{number, aggregate, parameterValues};
+}
+
+void RunReporter::settle(const ObjectiveAggregator& aggregator) {
+  if (!aggregator.isSettled()) return;
+  for (const Unsettled& evaluation : unsettled_) {
+    const double aggregate = aggregator.aggregate(evaluation.objectiveValues);
+    results_.replaceAggregate(evaluation.number, aggregate);
+    considerAsBest(evaluation.number, aggregate, evaluation.parameterValues);
+  }
+  unsettled_.clear();
 }
 
 }  // namespace mirevo

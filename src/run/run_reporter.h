@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "evaluation/evaluation_observer.h"
+#include "measures/objective_functions.h"
 #include "parameters/search_space.h"
 #include "run/failed_run_file.h"
 #include "run/result_file.h"
@@ -23,7 +24,11 @@ class RunReporter final : public EvaluationObserver {
   void evaluationFinished(std::span<const double> set, const EvaluationResult& result) override;
   bool isCancelled() override { return state_.progress.isCancelled(); }
 
-  /// The evaluation with the smallest aggregate, the first of equals.
+  /// At the end of a run: fills in the aggregates of evaluations that came before the objective transformation was
+  /// settled, where it is now.
+  void settle(const ObjectiveAggregator& aggregator);
+
+  /// The evaluation with the smallest aggregate; of equals the one with the smallest number.
   struct Best {
     int number = 0;
     double aggregate = 0.0;
@@ -36,11 +41,20 @@ class RunReporter final : public EvaluationObserver {
   const std::string& lastFailureReason() const { return lastFailureReason_; }
 
  private:
+  /// An evaluation whose aggregate was not known when it arrived.
+  struct Unsettled {
+    int number = 0;
+    std::vector<double> parameterValues;
+    std::vector<double> objectiveValues;
+  };
+  void considerAsBest(int number, double aggregate, const std::vector<double>& parameterValues);
+
   RunState& state_;
   ResultFile& results_;
   FailedRunFile& failedRuns_;
   const SearchSpace& space_;
   std::optional<Best> best_;
+  std::vector<Unsettled> unsettled_;
   int evaluationCount_ = 0;
   int failedCount_ = 0;
   std::string lastFailureReason_;

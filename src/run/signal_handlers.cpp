@@ -165,8 +165,9 @@ void installSignalHandlers() {
   if (!isIgnored(SIGHUP)) install(SIGHUP, handleSignal);
   // Whoever started the program may have blocked them.
   ::sigprocmask(SIG_UNBLOCK, &handled, nullptr);
-  // A reader of our output that goes away must not end the run: writing to it then fails, and is let go.
+  // A reader of our output that goes away, or a limit on file sizes: the write that fails says so.
   ::signal(SIGPIPE, SIG_IGN);
+  ::signal(SIGXFSZ, SIG_IGN);
 }
 
 }  // namespace mirevo
