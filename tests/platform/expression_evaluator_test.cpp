@@ -1,8 +1,8 @@
 #include "platform/expression_evaluator.h"
 
-#include <clocale>
 #include <cmath>
 #include <limits>
+#include <locale>
 #include <numbers>
 
 #include <gmock/gmock.h>
@@ -234,12 +234,18 @@ TEST(ExpressionEvaluator, ParametersHideConstants) {
   EXPECT_THROW(evaluator.compile("pi"), FatalError) << "pi where a parameter PI exists is a slip of the pen";
 }
 
+/// A decimal comma, whichever locales are installed.
+class DecimalComma final : public std::numpunct<char> {
+  char do_decimal_point() const override { return ','; }
+  char do_thousands_sep() const override { return '.'; }
+  std::string do_grouping() const override { return "\3"; }
+};
+
 TEST(ExpressionEvaluator, DoesNotFollowTheLocale) {
-  // Skipped parts are harmless where the locale is not installed.
-  const char* previous = std::setlocale(LC_ALL, "de_DE.UTF-8");
+  const std::locale previous = std::locale::global(std::locale(std::locale::classic(), new DecimalComma));
   const ExpressionEvaluator evaluator({}, {});
-  EXPECT_EQ(evaluator.EvaluateExpression("max(1.5, 1)"), 1.5);
-  if (previous != nullptr) std::setlocale(LC_ALL, "C");
+  EXPECT_EQ(evaluator.EvaluateExpression("max(1.5, 1) + 1234.25"), 1235.75);
+  std::locale::global(previous);
 }
 
 }  // namespace
