@@ -1,5 +1,6 @@
 #include "platform/kdx.h"
 
+#include <algorithm>
 #include <utility>
 
 #include <fmt/format.h>
@@ -9,12 +10,11 @@
 namespace mirevo {
 namespace {
 
-/// The place of the `instance`-th element of a name in an index, or -1.
-template <class Index>
-std::ptrdiff_t placeOf(const Index& index, std::string_view name, int instance) {
-  const auto found = index.find(name);
-  if (found == index.end() || instance < 1 || static_cast<std::size_t>(instance) > found->second.size()) return -1;
-  return static_cast<std::ptrdiff_t>(found->second[static_cast<std::size_t>(instance) - 1]);
+const std::string& nameOfKeyword(const KdxKeyword& keyword) {
+  return keyword.name;
+}
+const std::string& nameOfSection(const std::unique_ptr<KdxSection>& section) {
+  return section->name();
 }
 
 bool isNameCharacter(char c) {
@@ -137,29 +137,65 @@ class KdxParser final {
 
 KdxSection::KdxSection(std::string name, KdxPosition position) : name_(std::move(name)), position_(position) {}
 
+template <class Elements, class NameOf>
+void KdxSection::NameIndex::add(const Elements& elements, NameOf nameOf) {
+  if (places_ != nullptr) {
+    (*places_)[nameOf(elements.back())].push_back(elements.size() - 1);
+  } else if (elements.size() > kSearchedAsItStands) {
+    places_ = std::make_unique<Places>();
+    for (std::size_t i = 0; i < elements.size(); ++i) (*places_)[nameOf(elements[i])].push_back(i);
+  }
+}
+
+template <class Elements, class NameOf>
+std::size_t KdxSection::NameIndex::find(const Elements& elements, NameOf nameOf, std::string_view name,
+                                        int instance) const {
+  if (places_ != nullptr) {
+    const auto found = places_->find(name);
+    const bool exists =
+        found != places_->end() && instance >= 1 && static_cast<std::size_t>(instance) <= found->second.size();
+    return exists ? found->second[static_cast<std::size_t>(instance) - 1] : elements.size();
+  }
+  for (std::size_t i = 0; i < elements.size(); ++i) {
+    if (nameOf(elements[i]) == name && --instance == 0) return i;
+  }
+  return elements.size();
+}
+
+template <class Elements, class NameOf>
+std::size_t KdxSection::NameIndex::count(const Elements& elements, NameOf nameOf, std::string_view name) const {
+  if (places_ != nullptr) {
+    const auto found = places_->find(name);
+    return found == places_->end() ? 0 : found->second.size();
+  }
+  return static_cast<std::size_t>(
+      std::count_if(elements.begin(), elements.end(), [&](const auto& element) { return nameOf(element) == name; }));
+}
+
 const KdxSection* KdxSection::section(std::string_view name, int instance) const {
-  const std::ptrdiff_t place = placeOf(sectionIndex_, name, instance);
-  return place < 0 ? nullptr : sections_[static_cast<std::size_t>(place)].get();
+  const std::size_t place = sectionIndex_.find(sections_, nameOfSection, name, instance);
+  return place == sections_.size() ? nullptr : sections_[place].get();
 }
 
 const KdxKeyword* KdxSection::keyword(std::string_view name, int instance) const {
-  const std::ptrdiff_t place = placeOf(keywordIndex_, name, instance);
-  return place < 0 ? nullptr : &keywords_[static_cast<std::size_t>(place)];
+  const std::size_t place = keywordIndex_.find(keywords_, nameOfKeyword, name, instance);
+  return place == keywords_.size() ? nullptr : &keywords_[place];
 }
 
 int KdxSection::keywordCount(std::string_view name) const {
-  const auto found = keywordIndex_.find(name);
-  return found == keywordIndex_.end() ? 0 : static_cast<int>(found->second.size());
+  return static_cast<int>(keywordIndex_.count(keywords_, nameOfKeyword, name));
 }
 
 KdxKeyword& KdxSection::addKeyword(KdxKeyword keyword) {
-  keywordIndex_[keyword.name].push_back(keywords_.size());
-  return keywords_.emplace_back(std::move(keyword));
+  keywords_.push_back(std::move(keyword));
+  keywordIndex_.add(keywords_, nameOfKeyword);
+  return keywords_.back();
 }
 
 KdxSection& KdxSection::addSection(std::string name, KdxPosition position) {
-  sectionIndex_[name].push_back(sections_.size());
-  return *sections_.emplace_back(std::make_unique<KdxSection>(std::move(name), position));
+  sections_.push_back(std::make_unique<KdxSection>(std::move(name), position));
+  sectionIndex_.add(sections_, nameOfSection);
+  return *sections_.back();
 }
 
 std::variant<KdxDocument, KdxSyntaxError> parseKdx(std::string sourceName, std::string_view text) {

@@ -58,13 +58,30 @@ class KdxSection final {
   KdxSection& addSection(std::string name, KdxPosition position);
 
  private:
-  /// Lets a look-up go without a copy of the name.
-  struct NameHash {
-    using is_transparent = void;
-    std::size_t operator()(std::string_view name) const { return std::hash<std::string_view>{}(name); }
+  /// Places of each name in file order. A section of a few entries is searched as it stands, which takes a fraction of
+  /// the memory: a setup has one long list and thousands of short sections.
+  class NameIndex {
+   public:
+    /// Takes up the last of `elements`, whose names `nameOf` gives.
+    template <class Elements, class NameOf>
+    void add(const Elements& elements, NameOf nameOf);
+    /// The place of the `instance`-th element of that name; `elements.size()` when there is none.
+    template <class Elements, class NameOf>
+    std::size_t find(const Elements& elements, NameOf nameOf, std::string_view name, int instance) const;
+    template <class Elements, class NameOf>
+    std::size_t count(const Elements& elements, NameOf nameOf, std::string_view name) const;
+
+   private:
+    static constexpr std::size_t kSearchedAsItStands = 16;
+    /// Lets a look-up go without a copy of the name.
+    struct NameHash {
+      using is_transparent = void;
+      std::size_t operator()(std::string_view name) const { return std::hash<std::string_view>{}(name); }
+    };
+    using Places = std::unordered_map<std::string, std::vector<std::size_t>, NameHash, std::equal_to<>>;
+
+    std::unique_ptr<Places> places_;  ///< none while there are few entries
   };
-  /// Places of a name in file order.
-  using NameIndex = std::unordered_map<std::string, std::vector<std::size_t>, NameHash, std::equal_to<>>;
 
   std::string name_;
   KdxPosition position_;

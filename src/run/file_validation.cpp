@@ -17,33 +17,37 @@ std::string shown(const std::string& path, std::string_view keyword, const Setup
   return written.empty() ? path : written;
 }
 
-}  // namespace
-
-void validateFileExists(const std::string& path, std::string_view keyword, const SetupSection& section) {
+/// Why there is no file to read at `path`; empty where there is one. Devices and pipes are none: a read of them may
+/// never end.
+std::string faultOfFile(const std::string& path) {
   struct stat status {};
+  if (path.empty()) return "expected the name of a file, found a blank text";
   std::string reason;
   if (::stat(path.c_str(), &status) != 0) {
     reason = std::strerror(errno);
-  } else if (S_ISDIR(status.st_mode)) {
-    reason = std::strerror(EISDIR);
-  } else {
-    return;
+  } else if (!S_ISREG(status.st_mode)) {
+    reason = S_ISDIR(status.st_mode) ? std::strerror(EISDIR) : "Not a regular file";
   }
-  section.refuse(fmt::format("Error: The file {} does not exist", shown(path, keyword, section)), keyword,
-                 fmt::format("{}: {}", path, reason));
+  return reason.empty() ? reason : fmt::format("{}: {}", path, reason);
+}
+
+}  // namespace
+
+void validateFileExists(const std::string& path, std::string_view keyword, const SetupSection& section) {
+  const std::string fault = faultOfFile(path);
+  if (fault.empty()) return;
+  section.refuse(fmt::format("Error: The file {} does not exist", shown(path, keyword, section)), keyword, fault);
 }
 
 void validateFileOpens(const std::string& path, std::string_view keyword, const SetupSection& section,
                        std::string_view message) {
-  std::string reason;
-  if (path.empty()) {
-    reason = "expected the name of a file, found a blank text";
-  } else if (readTextFile(path, reason)) {
-    return;
-  } else {
-    reason = path + ": " + reason;
+  std::string fault = faultOfFile(path);
+  if (fault.empty()) {
+    std::string reason;
+    if (readTextFile(path, reason)) return;
+    fault = fmt::format("{}: {}", path, reason);
   }
-  section.refuse(fmt::format("{}{}", message, shown(path, keyword, section)), keyword, reason);
+  section.refuse(fmt::format("{}{}", message, shown(path, keyword, section)), keyword, fault);
 }
 
 void validateInBaseFolder(const std::string& path, const std::string& baseFolder, std::string_view keyword,

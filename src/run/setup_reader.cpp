@@ -25,7 +25,7 @@ constexpr std::array<std::string_view, 14> kModelSetupEndings = {
 /// One method a section, called in the order of the sections; each validates what it has read before it returns.
 class SetupReader final {
  public:
-  SetupReader(SetupFile& file, const SetupLocation& location) : file_(file), target_(file.target()) {
+  SetupReader(SetupFile& file, const SetupLocation& location) : target_(file.target()) {
     config_.setupFile = location.file;
     config_.setupFolder = location.folder;
     config_.setupName = location.name;
@@ -96,7 +96,6 @@ class SetupReader final {
   void readMeasureFile();
   void validateTransformations(bool hasInitialSample) const;
 
-  SetupFile& file_;
   SetupSection target_;
   RunConfig config_;
   std::vector<SetupSection> parameterSections_;

@@ -101,6 +101,24 @@ TEST(Kdx, TellsSectionsAndKeywordsOfOneNameApartByInstance) {
   EXPECT_NE(document.root.section("U"), nullptr);
 }
 
+// Beyond a few entries a section is searched by an index.
+TEST(Kdx, LookUpsAreTheSameInShortAndLongSections) {
+  for (const int count : {16, 17, 40}) {
+    std::string text = "[T]\n";
+    for (int i = 0; i < count; ++i)
+      text.append("k").append(std::to_string(i % 3)).append(" = ").append(std::to_string(i)).append("\n[S][/S]\n");
+    const KdxDocument document = parse(text + "[/T]");
+    const KdxSection& target = *document.root.section("T");
+    EXPECT_EQ(target.keywordCount("k0"), (count + 2) / 3);
+    EXPECT_EQ(std::get<std::int32_t>(target.keyword("k1", 5)->values[0].value), 13);
+    EXPECT_EQ(target.keyword("k1", (count + 1) / 3 + 1), nullptr);
+    EXPECT_EQ(target.keyword("k1", 0), nullptr);
+    EXPECT_EQ(target.keyword("none"), nullptr);
+    EXPECT_EQ(target.section("S", count), target.sections().back().get());
+    EXPECT_EQ(target.section("S", count + 1), nullptr);
+  }
+}
+
 TEST(Kdx, BoundsNestingAndTheLengthOfMessages) {
   const auto nested = [](std::size_t depth) {
     std::string text;

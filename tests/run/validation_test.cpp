@@ -208,6 +208,8 @@ const std::vector<Refused>& refusedValues() {
       {{{"Initial_Sample_Generation = 4", "Initial_Sample_Generation = 5"}},
        "Error: Initial sample generation method invalid",
        ""},
+      {{{"'sample.txt'", "'/dev/zero'"}}, "Error: Unable to open /dev/zero", "Not a regular file"},
+      {{{"'sample.txt'", "''"}}, "Error: Unable to open ", "expected the name of a file, found a blank text"},
       {{{"'sample.txt'", "'none.txt'"}}, "Error: Unable to open none.txt", "No such file"},
       {{{"Max_No_Evaluations = 500", "Max_No_Evaluations = 0"}}, "Error: Maximum No. of model evaluations invalid", ""},
       {{{"No_Loops_Convergence = 12", "No_Loops_Convergence = 0"}},
