@@ -45,6 +45,7 @@ SetupSection SetupFile::target() {
 }
 
 std::string SetupFile::place(KdxPosition position) const {
+  if (position.line == 0) return document_.sourceName;  // the file as a whole
   return fmt::format("{}:{}:{}", document_.sourceName, position.line, position.column);
 }
 

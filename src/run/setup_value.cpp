@@ -34,7 +34,11 @@ std::string_view wanted(KeywordType type) {
 std::string found(const KdxValue& value) {
   struct Words {
     std::string operator()(std::int32_t number) const { return std::to_string(number); }
-    std::string operator()(double number) const { return formatReal(number); }
+    std::string operator()(double number) const {
+      const std::string text = formatReal(number);
+      const bool isWhole = text.find_first_not_of("-0123456789") == std::string::npos;
+      return isWhole && parseInteger(text) ? text + ".0" : text;  // tells 2.0 from 2 where that is the fault
+    }
     std::string operator()(const std::string& text) const { return "the text " + quotedForMessage(text); }
     std::string operator()(const DateRecord& date) const { return "the date " + formatKdxDate(date); }
   };
