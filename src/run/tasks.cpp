@@ -46,8 +46,7 @@ std::string runOptimisation(const TaskContext& context) {
   if (!isKnownSearch) return std::string(kEndOfTask);
 
   UniformGenerator random(context.config.randomSeed);
-  SearchBounds bounds{context.space.lower, context.space.upper, context.space.initial};
-  const auto search = createSearch(optimisation, std::move(bounds), context.evaluator, random);
+  const auto search = createSearch(optimisation, context.space, context.evaluator, random);
   runSearch(*search, searchShortName(optimisation.algorithmType));
 
   const SearchSummary& summary = search->summary();
@@ -83,34 +82,6 @@ std::string runTask(const TaskContext& context) {
       fatalError("Error: Uncertainty analysis is not available in this version");
   }
   return std::string(kEndOfTask);
-}
-
-std::string taskName(const RunConfig& config) {
-  switch (config.simulationOption) {
-    case SimulationOption::scenarioRuns:
-      return config.scenario.scenarioType == 0 ? "Scenario runs: Single run using initial parameter set"
-                                               : "Scenario runs: Multiple runs";
-    case SimulationOption::sensitivityAnalysis:
-      return "Sensitivity analysis: Local sensitivity analysis";
-    case SimulationOption::parameterOptimisation: {
-      std::string name = "Parameter optimisation";
-      switch (config.optimisation.algorithmType) {
-        case AlgorithmType::sce:
-          name += ": Shuffled Complex Evolution";
-          break;
-        case AlgorithmType::pse:
-          name += ": Population Simplex Evolution";
-          break;
-        case AlgorithmType::dds:
-          name += ": Dynamically Dimensioned Search";
-          break;
-      }
-      return config.optimisation.useSurrogateModel == 1 ? name + " with surrogate model" : name;
-    }
-    case SimulationOption::uncertaintyAnalysis:
-      return "Uncertainty analysis";
-  }
-  return {};
 }
 
 std::string_view resultFileEnding(const RunConfig& config) {
