@@ -2,8 +2,6 @@
 
 #include <cmath>
 
-#include <fmt/format.h>
-
 #include "common/fatal_error.h"
 
 namespace mirevo {
@@ -27,9 +25,8 @@ void RunReporter::evaluationFinished(std::span<const double> set, const Evaluati
   state_.objectiveValues = result.objectiveValues;
   if (!result.ok()) {
     ++failedCount_;
-    lastFailureReason_ = result.failure->reason;
     failedRuns_.add(values, result);
-    state_.log.line(fmt::format("   Evaluation No. {}: {}", result.number, lastFailureReason_));
+    state_.log.line("   " + result.failure->reason);  // below the message that it failed
   } else if (std::isnan(result.aggregate)) {
     unsettled_.push_back({result.number, values, result.objectiveValues});
   } else if (!result.objectiveValues.empty()) {

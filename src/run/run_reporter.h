@@ -38,7 +38,6 @@ class RunReporter final : public EvaluationObserver {
 
   int evaluationCount() const { return evaluationCount_; }
   int failedCount() const { return failedCount_; }
-  const std::string& lastFailureReason() const { return lastFailureReason_; }
 
  private:
   /// An evaluation whose aggregate was not known when it arrived.
@@ -57,7 +56,6 @@ class RunReporter final : public EvaluationObserver {
   std::vector<Unsettled> unsettled_;
   int evaluationCount_ = 0;
   int failedCount_ = 0;
-  std::string lastFailureReason_;
 };
 
 }  // namespace mirevo

@@ -5,9 +5,19 @@
 #include <fmt/format.h>
 
 #include "algorithms/dds.h"
+#include "algorithms/initial_sample.h"
+#include "algorithms/sce.h"
 #include "common/fatal_error.h"
 
 namespace mirevo {
+
+namespace {
+
+[[noreturn]] void notAvailable(std::string_view name) {
+  fatalError(fmt::format("Error: The {} algorithm is not available in this version", name));
+}
+
+}  // namespace
 
 std::string_view searchShortName(AlgorithmType type) {
   switch (type) {
@@ -21,16 +31,23 @@ std::string_view searchShortName(AlgorithmType type) {
   return {};
 }
 
-std::unique_ptr<SearchAlgorithm> createSearch(const OptimisationConfig& config, SearchBounds bounds,
+std::unique_ptr<SearchAlgorithm> createSearch(const OptimisationConfig& config, const SearchSpace& space,
                                               Evaluator& evaluator, UniformGenerator& random) {
-  if (config.algorithmType == AlgorithmType::dds && config.useSurrogateModel == 0) {
+  if (config.useSurrogateModel != 0)
+    notAvailable("surrogate-assisted " + std::string(searchShortName(config.algorithmType)));
+  SearchBounds bounds = searchBounds(space);
+  if (config.algorithmType == AlgorithmType::dds) {
     return std::make_unique<Dds>(config.dds, config.stopping.maxEvaluations,
                                  config.initialSample.includeInitialParameters, std::move(bounds), evaluator, random);
   }
-  fatalError(
-      fmt::format("Error: The {}{} algorithm is not available in this version",
-                  config.useSurrogateModel != 0 ? "surrogate-assisted " : "", searchShortName(config.algorithmType)),
-      "Set Algorithm_Type = 2 and Use_Surrogate_Model = 0 for Dynamically Dimensioned Search.");
+  SearchProblem problem{std::move(bounds), config.stopping, config.initialSample, {}, evaluator, random};
+  if (config.initialSample.generation == static_cast<std::int32_t>(SampleGeneration::fromFile)) {
+    problem.givenSample = loadInitialSample(config.initialSample.fileName, space);
+  }
+  if (config.algorithmType == AlgorithmType::sce) {
+    return std::make_unique<Sce>(config.sce, config.simplex, std::move(problem));
+  }
+  notAvailable(searchShortName(config.algorithmType));
 }
 
 }  // namespace mirevo

@@ -46,8 +46,7 @@ std::string runOptimisation(const TaskContext& context) {
   if (!isKnownSearch) return std::string(kEndOfTask);
 
   UniformGenerator random(context.config.randomSeed);
-  SearchBounds bounds{context.space.lower, context.space.upper, context.space.initial};
-  const auto search = createSearch(optimisation, std::move(bounds), context.evaluator, random);
+  const auto search = createSearch(optimisation, context.space, context.evaluator, random);
   runSearch(*search, searchShortName(optimisation.algorithmType));
 
   const SearchSummary& summary = search->summary();
