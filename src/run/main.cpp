@@ -1,6 +1,5 @@
-#include <cstdio>
+#include "run/mirevo_main.h"
 
-int main() {
-  std::fputs("Usage: Mirevo kdx-file\n", stderr);
-  return 1;
+int main(int argc, char** argv) {
+  mirevo::processStart(argc, argv);
 }

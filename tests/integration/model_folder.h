@@ -16,9 +16,9 @@ struct RunSettings {
   int option = 2;
   int maxEvaluations = 40;
   int seed = 1;
-  std::vector<std::string> scenarios;  ///< values of a, b and c, "1, 2, 3"; none: a single run
+  std::vector<std::string> scenarios = {};  ///< values of a, b and c, "1, 2, 3"; none: a single run
   int slots = 1;
-  std::string modelArguments;
+  std::string modelArguments = {};
   std::string batchFile = "model/run.sh";
   std::string templateFile = "model/parameters.tpl";
   std::string simulationFile = "model/simulated.csv";

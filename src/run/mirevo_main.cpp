@@ -1,0 +1,88 @@
+#include "run/mirevo_main.h"
+
+#include <cstdio>
+#include <cstdlib>
+#include <fcntl.h>
+#include <filesystem>
+#include <string>
+#include <unistd.h>
+
+#include <fmt/format.h>
+
+#include "platform/front_end.h"
+#include "run/run_driver.h"
+#include "run/stop_run.h"
+#include "run/version.h"
+
+namespace mirevo {
+namespace {
+
+constexpr std::string_view kUsage = "Usage: Mirevo kdx-file";
+
+constexpr std::string_view kHelp = R"(
+Calibrates and analyses a simulation model as the setup file (KDX format) says.
+
+  //qmon      messages for the progress viewer
+  --version   prints the version
+  --help      prints this text
+
+Written beside the setup file: <setup>.log and the results of every evaluation. VOLK_PROGRESS=STDOUT prints the run's
+messages here; creating the file <setup>._kill_ cancels the run.
+)";
+
+/// Answers a question about the program itself; false when the argument is none, or names a file.
+bool answerQuestion(const std::string& argument) {
+  std::error_code ignored;
+  if (std::filesystem::exists(argument, ignored)) return false;
+  if (argument == "--version") {
+    fmt::print("Mirevo {}\n", programVersion());
+  } else if (argument == "--help") {
+    fmt::print("{}\n{}", kUsage, kHelp);
+  } else {
+    return false;
+  }
+  return true;
+}
+
+/// A run whose caller has closed standard input, output or error would open its files in their place, and messages
+/// would end up in the results.
+void occupyStandardDescriptors() {
+  int descriptor = 0;
+  do {
+    descriptor = ::open("/dev/null", O_RDWR | O_CLOEXEC);
+  } while (descriptor >= 0 && descriptor <= STDERR_FILENO);
+  if (descriptor > STDERR_FILENO) ::close(descriptor);
+}
+
+}  // namespace
+
+void processStart(int argc, char** argv) {
+  occupyStandardDescriptors();
+  const CommandLine commandLine(argc, argv);
+  runWithFrontEnd(commandLine.wantsProgressViewer() ? "G48=QMON" : "G48=WIN", commandLine);
+}
+
+void runWithFrontEnd(std::string_view environmentSetting, const CommandLine& commandLine) {
+  const std::size_t equals = environmentSetting.find('=');
+  const std::string name(environmentSetting.substr(0, equals));
+  const std::string value(environmentSetting.substr(equals + 1));
+  ::setenv(name.c_str(), value.c_str(), 1);
+  mirevoMain(commandLine);
+}
+
+void mirevoMain(const CommandLine& commandLine) {
+  const std::string setupFileName(commandLine.setupFileName());
+  if (setupFileName.empty()) {
+    showMessage(kUsage);
+    stopRun(1);
+  }
+  if (answerQuestion(setupFileName)) stopRun(0);
+  int exitCode = 1;
+  {
+    RunDriver driver;
+    exitCode = driver.run(setupFileName);
+  }
+  stopRun(exitCode);
+}
+
+}  // namespace mirevo

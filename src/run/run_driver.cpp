@@ -1,0 +1,209 @@
+#include "run/run_driver.h"
+
+#include <filesystem>
+#include <new>
+
+#include <fmt/format.h>
+
+#include "common/fatal_error.h"
+#include "common/text.h"
+#include "evaluation/local_evaluator.h"
+#include "platform/posix_process_launcher.h"
+#include "run/mpi_start.h"
+#include "run/setup_reader.h"
+#include "run/signal_handlers.h"
+#include "run/signal_state.h"
+#include "run/tasks.h"
+#include "run/version.h"
+
+namespace mirevo {
+namespace {
+
+constexpr std::string_view kNormalTermination = "Normal termination";
+constexpr double kPatienceSeconds = 3.0;  ///< for an earlier run of the setup that is just ending
+
+std::string environmentValue(const char* name) {
+  const char* value = std::getenv(name);
+  return value == nullptr ? std::string{} : std::string(value);
+}
+
+ModelDescription describeModel(const RunConfig& config) {
+  ModelDescription model;
+  model.baseFolder = config.baseFolder;
+  model.fileTag = config.setupName;
+  model.parameterFiles = config.parameterFiles;
+  model.measures = config.measures;
+  model.measureFile = config.measureFile;
+  model.period = config.period;
+  model.objectives = config.objectives;
+  return model;
+}
+
+LauncherSettings launcherSettings(const RunConfig& config, const std::string& filePrefix) {
+  LauncherSettings settings;
+  settings.baseFolder = config.baseFolder;
+  settings.processFolderPrefix = filePrefix + "_Process";
+  settings.batchItems = config.batchItems;
+  settings.slotCount = config.simultaneousSimulations;
+  settings.useSingleThread = config.useSingleThread;
+  return settings;
+}
+
+}  // namespace
+
+RunDriver::RunDriver() = default;
+
+RunDriver::~RunDriver() {
+  signalState.runLogDescriptor = -1;
+}
+
+int RunDriver::run(const std::string& setupFileName) {
+  try {
+    startMpi(state_);
+    openRun(setupFileName);
+    config_ = readSetupFile(setupFileName, state_.log);
+    buildModel();
+    openResults();
+    state_.progress.writeStatus(taskName(config_));
+    state_.progress.progressEvaluationLabel(config_.plannedEvaluations());
+    finish(runTask({config_, parameters_->searchSpace(), *evaluator_, state_.log}));
+    return 0;
+  } catch (const FatalError& error) {
+    return endInError(error.message(), error.detail());
+  } catch (const RunCancelled&) {
+    return endCancelled();
+  } catch (const std::bad_alloc&) {
+    return endInError(
+        evaluator_ ? "Error: Unable to allocate memory" : "Error: Unable to allocate memory in MIREVO setup", {});
+  } catch (const std::exception& error) {
+    return endInError("Error: Unexpected failure", error.what());
+  }
+}
+
+void RunDriver::openRun(const std::string& setupFileName) {
+  installSignalHandlers();
+  const SetupLocation setup = locateSetup(setupFileName);
+  filePrefix_ = setup.folder + "/" + setup.name;
+  if (!lock_.take(setup.file, kPatienceSeconds)) {
+    fatalError("Error: Another run of this setup is in progress",
+               setup.file + ": both would work in the same folders. Wait for it, or run a copy under another name.");
+  }
+  const std::string logFile = filePrefix_ + ".log";
+  const std::string keptLog = keepEarlierFile(logFile);
+  std::string reason;
+  if (!state_.log.open(logFile, reason)) fatalError("Error: Unable to open " + logFile, reason);
+  signalState.runLogDescriptor = state_.log.descriptor();
+  state_.log.line(fmt::format("Mirevo {}, started {}", programVersion(), dateAndTimeNow()));
+  state_.log.line("Setup file: " + setup.file);
+  if (!keptLog.empty()) state_.log.line("The log of the earlier run was kept as " + keptLog);
+
+  const std::string problems = state_.progress.progressInit(logFile, environmentValue("VOLK_PROGRESS"));
+  for (const std::string_view problem : splitLines(problems)) {
+    state_.log.warning(problem);
+    showMessage(problem);
+  }
+  state_.progress.progressStart();
+}
+
+void RunDriver::buildModel() {
+  parameters_ = std::make_unique<ParameterModel>(config_.parameters, config_.constraints);
+  aggregator_ = std::make_unique<ObjectiveAggregator>(config_.objectives, config_.aggregationMethod);
+  launcher_ = std::make_unique<PosixProcessLauncher>();
+  signalState.haltProcesses = haltProcessesFromSignal;
+  runner_ = std::make_unique<ModelRunner>(describeModel(config_), *parameters_, *aggregator_, *launcher_,
+                                          launcherSettings(config_, filePrefix_));
+}
+
+void RunDriver::openResults() {
+  const SearchSpace& space = parameters_->searchSpace();
+  const std::string failedRunPath = std::filesystem::path(filePrefix_).replace_filename("calSimErr.dat").string();
+  keepEarlierFile(failedRunPath);
+  failedRunFile_ = std::make_unique<FailedRunFile>(failedRunPath, config_.setupName, space.names);
+
+  const std::string path = filePrefix_ + std::string(resultFileEnding(config_));
+  if (const std::string kept = keepEarlierFile(path); !kept.empty()) {
+    state_.log.line("The results of the earlier run were kept as " + kept);
+  }
+  ResultColumns columns;
+  columns.parameters = space.names;
+  for (const OutputMeasure& measure : config_.measures) columns.measures.push_back(measure.name);
+  for (const ObjectiveFunction& objective : config_.objectives) columns.objectives.push_back(objective.name);
+  const std::vector<std::string> head{config_.title, fmt::format("Mirevo {}", programVersion()), taskName(config_),
+                                      "Setup file: " + config_.setupFile, "Started: " + dateAndTimeNow()};
+  results_.open(path, head, columns);
+
+  reporter_ = std::make_unique<RunReporter>(state_, results_, *failedRunFile_, space);
+  failedRunPolicy_.emplace(config_.plannedEvaluations());
+  evaluator_ =
+      std::make_unique<LocalEvaluator>(*runner_, *reporter_, *failedRunPolicy_, config_.simultaneousSimulations);
+  state_.objectiveValues.resize(config_.objectives.size());
+}
+
+std::vector<std::string> RunDriver::closingLines(std::string_view terminationMessage) const {
+  std::vector<std::string> lines{std::string(terminationMessage)};
+  if (!reporter_ || !reporter_->best()) return lines;
+  const RunReporter::Best& best = *reporter_->best();
+  lines.push_back(fmt::format("Best evaluation: {}", best.number));
+  lines.push_back("Best aggregate: " + formatReal(best.aggregate));
+  const std::vector<std::string>& names = parameters_->searchSpace().names;
+  for (std::size_t i = 0; i < names.size(); ++i) {
+    lines.push_back(fmt::format("Best {} = {}", names[i], formatReal(best.parameterValues[i])));
+  }
+  return lines;
+}
+
+bool RunDriver::closeResults(std::string_view terminationMessage, std::string& reason) {
+  if (reporter_) reporter_->settle(*aggregator_);
+  return results_.finish(closingLines(terminationMessage), reason);
+}
+
+void RunDriver::finish(std::string_view terminationMessage) {
+  std::string reason;
+  if (!closeResults(terminationMessage, reason)) {
+    fatalError("Error: Unable to write to " + results_.path(), reason);
+  }
+  state_.log.line("");
+  state_.log.line(
+      fmt::format("{} model evaluations, {} of them failed", reporter_->evaluationCount(), reporter_->failedCount()));
+  state_.log.line("");
+  state_.log.line(kNormalTermination);
+  if (!state_.log.writeError().empty()) {
+    fatalError("Error: Unable to write to " + state_.log.path(), state_.log.writeError());
+  }
+  signalState.runLogDescriptor = -1;
+  state_.log.close();
+  state_.progress.progressEnd();
+}
+
+int RunDriver::endInError(std::string_view message, std::string_view detail) {
+  std::string text(trimTrailing(message));
+  if (!text.empty()) {
+    if (!detail.empty()) text.append("\n").append(detail);
+    if (reporter_ && reporter_->failedCount() > 0) text += "\nfailed model runs are described in calSimErr.dat";
+    state_.log.line("");
+    state_.log.line(text);
+    showMessage(text);
+  }
+  std::string reason;
+  closeResults(message, reason);  // the run has failed already, with the first reason
+  return endEarly();
+}
+
+int RunDriver::endCancelled() {
+  showMessage("Simulation cancelled");
+  std::string reason;
+  if (!closeResults("Simulation cancelled", reason)) {
+    state_.log.line(fmt::format("Error: Unable to write to {}\n{}", results_.path(), reason));
+  }
+  return endEarly();
+}
+
+int RunDriver::endEarly() {
+  signalState.runLogDescriptor = -1;
+  state_.log.close();
+  if (launcher_) launcher_->haltProcesses();
+  state_.progress.progressEnd();
+  return 1;
+}
+
+}  // namespace mirevo

@@ -1,0 +1,63 @@
+#pragma once
+
+#include <memory>
+#include <optional>
+#include <string>
+#include <string_view>
+
+#include "evaluation/evaluator.h"
+#include "evaluation/failed_run_policy.h"
+#include "evaluation/model_run.h"
+#include "measures/objective_functions.h"
+#include "parameters/parameter_model.h"
+#include "platform/process_launcher.h"
+#include "run/failed_run_file.h"
+#include "run/result_file.h"
+#include "run/run_config.h"
+#include "run/run_lock.h"
+#include "run/run_reporter.h"
+#include "run/run_state.h"
+
+namespace mirevo {
+
+/// One run from its setup file to its exit code. It owns everything that the run is made of, so that all of it is still
+/// there when an error is reported, and goes away in the reverse order of its making.
+class RunDriver final {
+ public:
+  RunDriver();
+  ~RunDriver();
+  RunDriver(const RunDriver&) = delete;
+  RunDriver& operator=(const RunDriver&) = delete;
+
+  /// Runs the setup file; 0 after "Normal termination", else 1. The one place where an error ends a run.
+  int run(const std::string& setupFileName);
+
+ private:
+  void openRun(const std::string& setupFileName);
+  void buildModel();
+  void openResults();
+  /// False, with the system's reason, when the results could not be brought to their end.
+  bool closeResults(std::string_view terminationMessage, std::string& reason);
+  void finish(std::string_view terminationMessage);
+  int endInError(std::string_view message, std::string_view detail);
+  int endCancelled();
+  /// Log closed, model processes halted, progress ended.
+  int endEarly();
+  std::vector<std::string> closingLines(std::string_view terminationMessage) const;
+
+  RunState state_;
+  RunLock lock_;
+  std::string filePrefix_;  ///< folder and name of the setup, without ".kdx": the run's files begin with it
+  RunConfig config_;
+  ResultFile results_;
+  std::unique_ptr<ParameterModel> parameters_;
+  std::unique_ptr<ObjectiveAggregator> aggregator_;
+  std::unique_ptr<FailedRunFile> failedRunFile_;
+  std::unique_ptr<RunReporter> reporter_;
+  std::optional<FailedRunPolicy> failedRunPolicy_;
+  std::unique_ptr<ProcessLauncher> launcher_;
+  std::unique_ptr<ModelRunner> runner_;
+  std::unique_ptr<Evaluator> evaluator_;
+};
+
+}  // namespace mirevo

@@ -1,0 +1,54 @@
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "integration/model_folder.h"
+
+namespace mirevo::testing {
+namespace {
+
+using ::testing::HasSubstr;
+using ::testing::StartsWith;
+
+TEST(CommandLine, WithoutASetupFileTheUsageIsShown) {
+  for (const std::vector<std::string>& arguments :
+       {std::vector<std::string>{}, {"//qmon"}, {"//QMON", "//other"}, {""}, {"a.kdx", " "}}) {
+    const ProgramResult result = runProgram(arguments);
+    EXPECT_EQ(result.exitCode, 1);
+    EXPECT_EQ(result.error, "Usage: Mirevo kdx-file\n");
+    EXPECT_EQ(result.output, "");
+  }
+}
+
+TEST(CommandLine, QuestionsAboutTheProgramAreAnswered) {
+  EXPECT_THAT(runProgram({"--version"}).output, StartsWith("Mirevo "));
+  const ProgramResult help = runProgram({"--help"});
+  EXPECT_THAT(help.output, StartsWith("Usage: Mirevo kdx-file\n"));
+  EXPECT_EQ(help.exitCode, 0);
+}
+
+TEST(CommandLine, AMissingSetupFileIsNamedOnStandardErrorAndInTheLog) {
+  const TemporaryFolder folder;
+  const ProgramResult result = runProgram({"ignored.kdx", folder.file("basin.kdx")});
+  EXPECT_EQ(result.exitCode, 1);
+  EXPECT_THAT(result.error, StartsWith("Error: Unable to open " + folder.file("basin.kdx")));
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("\n\nError: Unable to open " + folder.file("basin.kdx")));
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("No such file or directory"));
+  EXPECT_FALSE(folder.has("basin.dat"));
+
+  const ProgramResult nowhere = runProgram({folder.file("no/such/folder/basin.kdx")});
+  EXPECT_EQ(nowhere.exitCode, 1);
+  EXPECT_THAT(nowhere.error, HasSubstr(folder.file("no/such/folder/basin")));
+}
+
+TEST(CommandLine, AJobOfSeveralProcessesIsRefusedBeforeAnyFileIsTouched) {
+  const ModelFolder folder;
+  for (const char* variable : {"OMPI_COMM_WORLD_SIZE", "PMI_SIZE"}) {
+    const ProgramResult result = runProgram({folder.writeSetup({})}, {{variable, "4"}});
+    EXPECT_EQ(result.exitCode, 1);
+    EXPECT_THAT(result.error, HasSubstr("started 4 processes"));
+    EXPECT_FALSE(folder.has("basin.log"));
+  }
+}
+
+}  // namespace
+}  // namespace mirevo::testing

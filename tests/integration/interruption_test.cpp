@@ -1,0 +1,114 @@
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "integration/model_folder.h"
+
+namespace mirevo::testing {
+namespace {
+
+using ::testing::EndsWith;
+using ::testing::HasSubstr;
+using ::testing::Not;
+
+/// A run whose second scenario sleeps for an hour.
+class Interruption : public ::testing::Test {
+ protected:
+  Interruption() {
+    folder_.write("model/run.sh", fmt::format("#!/bin/sh\n"
+                                              "test -e first || {{ touch first; exec {0}; }}\n"
+                                              "echo $$ > model.pid\n"
+                                              "exec {0} \"$@\" --sleep-ms 3600000\n",
+                                              MIREVO_TEST_MODEL));
+    writeSetup("--grandchild grandchild.pid");
+  }
+
+  void writeSetup(const std::string& modelArguments) {
+    setup_ = folder_.writeSetup({.option = 0, .scenarios = {"1, 1, 1", "2, 2, 1"}, .modelArguments = modelArguments});
+  }
+
+  /// Waits until a file with a process id is there, and returns that.
+  int waitForProcess(const std::string& name) {
+    const std::string file = "basin_Process1/" + name;
+    EXPECT_TRUE(waitUntil([&] { return folder_.has(file) && folder_.read(file).ends_with("\n"); }))
+        << folder_.read("basin.log");
+    return std::atoi(folder_.read(file).c_str());
+  }
+  /// The model's own child, which ignores SIGTERM.
+  int waitForGrandchild() { return waitForProcess("grandchild.pid"); }
+
+  void expectGone(int process) {
+    EXPECT_GT(process, 0);
+    EXPECT_TRUE(waitUntil([&] { return !isRunning(process); }, 5.0));
+  }
+
+  void expectFirstRowIsThere() {
+    const ResultTable table = readResults(folder_.read("basin.dat"));
+    ASSERT_EQ(table.rows.size(), 2U);
+    EXPECT_EQ(table.rows[1][1], "OK");
+  }
+
+  ModelFolder folder_;
+  std::string setup_;
+};
+
+TEST_F(Interruption, AKillFileEndsTheRunWithinThreeSecondsAndNothingIsLeft) {
+  writeSetup("");
+  folder_.write("basin._kill_", "from an earlier run");
+  RunningProgram program({setup_});
+  const int model = waitForProcess("model.pid");
+  folder_.write("basin._kill_", "");
+  const ProgramResult result = program.wait(3.8);  // at most 3 seconds to the next look
+  EXPECT_FALSE(result.timedOut);
+  EXPECT_EQ(result.exitCode, 1);
+  EXPECT_EQ(result.error, "Simulation cancelled\n");
+  EXPECT_THAT(folder_.read("basin.log"), HasSubstr("Simulation cancelled"));
+  EXPECT_THAT(folder_.read("basin.log"), Not(HasSubstr("Normal termination")));
+  EXPECT_THAT(folder_.read("basin.dat"), HasSubstr("# Simulation cancelled\n"));
+  EXPECT_THAT(folder_.read("basin._spi_"), HasSubstr("MESSAGSimulation cancelled\n"));
+  expectFirstRowIsThere();
+  expectGone(model);
+}
+
+TEST_F(Interruption, ASignalEndsTheRunWithItsMessageAndNothingIsLeft) {
+  for (const auto& [signal, message] : {std::pair{SIGTERM, "Termination request"},
+                                        {SIGINT, "Control-C send"},
+                                        {SIGHUP, "Termination request"},
+                                        {SIGSEGV, "Illegal storage access"}}) {
+    RunningProgram program({setup_});
+    const int grandchild = waitForGrandchild();
+    program.send(signal);
+    const ProgramResult result = program.wait(5.0);
+    EXPECT_FALSE(result.timedOut);
+    EXPECT_EQ(result.exitCode, 128 + signal);
+    EXPECT_EQ(result.error, std::string(message) + "\n");
+    EXPECT_THAT(folder_.read("basin.log"), EndsWith(std::string(message) + "\n"));
+    expectFirstRowIsThere();
+    expectGone(grandchild);
+    std::filesystem::remove_all(folder_.file("basin_Process1"));
+  }
+}
+
+TEST_F(Interruption, AKilledRunLeavesNoModelBehind) {
+  RunningProgram program({setup_});
+  const int grandchild = waitForGrandchild();
+  program.send(SIGKILL);
+  EXPECT_EQ(program.wait(5.0).signal, SIGKILL);
+  expectFirstRowIsThere();
+  expectGone(grandchild);
+}
+
+TEST_F(Interruption, ASetupThatIsBeingRunIsNotRunASecondTime) {
+  RunningProgram program({setup_});
+  waitForGrandchild();
+  const std::string log = folder_.read("basin.log");
+  const ProgramResult second = runProgram({setup_});
+  EXPECT_EQ(second.exitCode, 1);
+  EXPECT_THAT(second.error, HasSubstr("Error: Another run of this setup is in progress"));
+  EXPECT_EQ(folder_.read("basin.log"), log);
+  EXPECT_FALSE(folder_.has("basin.1.log"));
+  program.send(SIGTERM);
+  EXPECT_EQ(program.wait(5.0).exitCode, 143);
+}
+
+}  // namespace
+}  // namespace mirevo::testing

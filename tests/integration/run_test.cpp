@@ -1,0 +1,142 @@
+#include <algorithm>
+#include <cstdlib>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "integration/model_folder.h"
+
+namespace mirevo::testing {
+namespace {
+
+using ::testing::Contains;
+using ::testing::ElementsAre;
+using ::testing::EndsWith;
+using ::testing::HasSubstr;
+using ::testing::Not;
+using ::testing::StartsWith;
+
+double number(const std::string& cell) {
+  return std::strtod(cell.c_str(), nullptr);
+}
+
+TEST(Optimisation, ACalibrationEndsWithItsBestSetInLogResultsAndModelFolder) {
+  const ModelFolder folder;
+  const ProgramResult result = runProgram({folder.writeSetup({.maxEvaluations = 200})});
+  ASSERT_EQ(result.exitCode, 0) << result.error;
+  EXPECT_EQ(result.output + result.error, "");
+
+  const ResultTable table = readResults(folder.read("basin_Optimisation.dat"));
+  ASSERT_EQ(table.rows.size(), 202U);  // header, the search's evaluations, the final model run
+  EXPECT_THAT(table.rows[0], ElementsAre("Evaluation", "Status", "a", "b", "flow", "fit", "Aggregate"));
+  double best = 1e30;
+  for (std::size_t i = 1; i < table.rows.size(); ++i) {
+    ASSERT_EQ(table.rows[i].size(), 7U);
+    EXPECT_EQ(table.rows[i][0], std::to_string(i));
+    EXPECT_EQ(table.rows[i][1], "OK");
+    best = std::min(best, number(table.rows[i][6]));
+  }
+  EXPECT_LT(best, 0.1);
+  EXPECT_EQ(number(table.rows.back()[6]), best);
+  EXPECT_THAT(table.comments.front(), HasSubstr("Small test basin"));
+  EXPECT_THAT(table.comments, Contains("# Optimisation terminated: Maximum number of model evaluations reached"));
+  EXPECT_THAT(table.comments, Contains(StartsWith("# Best evaluation: ")));
+  EXPECT_THAT(table.comments, Contains("# Best a = " + table.rows.back()[2]));
+
+  const std::string log = folder.read("basin.log");
+  EXPECT_THAT(log, HasSubstr("Optimisation terminated: Maximum number of model evaluations reached"));
+  EXPECT_THAT(log, HasSubstr("   a = " + table.rows.back()[2] + "\n"));
+  EXPECT_THAT(log, EndsWith("\n\nNormal termination\n"));
+  EXPECT_THAT(folder.read("basin._spi_"), EndsWith("PROGRE100.0\n"));
+  EXPECT_FALSE(folder.has("calSimErr.dat"));
+  EXPECT_NEAR(number(folder.read("basin_Process1/parameters.txt").substr(4)), number(table.rows.back()[2]), 1e-6);
+}
+
+TEST(Optimisation, ASecondRunGivesTheSameBitsAndKeepsTheFilesOfTheFirst) {
+  const ModelFolder folder;
+  const std::string setup = folder.writeSetup({.maxEvaluations = 30});
+  ASSERT_EQ(runProgram({setup}).exitCode, 0);
+  const auto first = readResults(folder.read("basin_Optimisation.dat")).rows;
+  const std::string firstLog = folder.read("basin.log");
+  ASSERT_EQ(runProgram({setup}).exitCode, 0);
+  EXPECT_EQ(readResults(folder.read("basin_Optimisation.dat")).rows, first);
+  EXPECT_EQ(readResults(folder.read("basin_Optimisation.1.dat")).rows, first);
+  EXPECT_EQ(folder.read("basin.1.log"), firstLog);
+}
+
+TEST(Scenarios, ASingleRunEvaluatesTheInitialSet) {
+  const ModelFolder folder;
+  ASSERT_EQ(runProgram({folder.writeSetup({.option = 0})}).exitCode, 0);
+  const ResultTable table = readResults(folder.read("basin.dat"));
+  ASSERT_EQ(table.rows.size(), 2U);
+  EXPECT_THAT(std::vector(table.rows[1].begin(), table.rows[1].begin() + 4), ElementsAre("1", "OK", "4", "1"));
+  // Simulated minus observed is -1 - sin(t / 58) over t = 0 ... 364.
+  EXPECT_NEAR(number(table.rows[1][4]), 1.224418, 1e-5);
+}
+
+TEST(Scenarios, RunsThatEndInAnotherOrderStandInTheirOwnInTheResults) {
+  const ModelFolder folder;
+  folder.useTemplate("sleep-ms = !b              !00\n");
+  const std::string setup =
+      folder.writeSetup({.option = 0, .scenarios = {"1, 5, 1", "2, 1, 1", "3, 0, 1", "4, 0, 1"}, .slots = 3});
+  const ProgramResult result = runProgram({setup}, {{"VOLK_PROGRESS", "STDOUT"}});
+  ASSERT_EQ(result.exitCode, 0) << result.error;
+  EXPECT_LT(result.output.find("No. 3 completed: OK"), result.output.find("No. 1 completed: OK")) << result.output;
+  const ResultTable table = readResults(folder.read("basin.dat"));
+  ASSERT_EQ(table.rows.size(), 5U);
+  for (std::size_t i = 1; i < 5; ++i) {
+    EXPECT_EQ(table.rows[i][0], std::to_string(i));
+    EXPECT_EQ(table.rows[i][2], std::to_string(i));
+  }
+  EXPECT_FALSE(folder.has("basin._spi_"));
+}
+
+TEST(FailedRuns, ASingleRunThatFailsEndsTheRunWithTheReason) {
+  const ModelFolder folder;
+  const ProgramResult result = runProgram({folder.writeSetup({.option = 0, .modelArguments = "--fail-above 3"})});
+  EXPECT_EQ(result.exitCode, 1);
+  for (const std::string& text : {result.error, folder.read("basin.log")}) {
+    EXPECT_THAT(text, HasSubstr("Error: Unable to continue. No of failed simulations too high."));
+    EXPECT_THAT(text, HasSubstr("run.sh exited with code 3"));
+  }
+  EXPECT_THAT(folder.read("basin.log"), Not(HasSubstr("Normal termination")));
+  EXPECT_THAT(folder.read("basin.dat"), HasSubstr("\n1\tFAILED\t4\t1\t1e+30\t1e+30\t1e+30\n"));
+  EXPECT_THAT(folder.read("basin.dat"), HasSubstr("# Error: Unable to continue."));
+  EXPECT_THAT(folder.read("calSimErr.dat"), HasSubstr("   a = 4\n   b = 1\n"));
+  EXPECT_THAT(folder.read("calSimErr.dat"), HasSubstr("a = 4 is too large"));
+}
+
+TEST(FailedRuns, ATenthOfTheRunsMayFail) {
+  const ModelFolder folder;
+  std::vector<std::string> scenarios(25, "1, 1, 1");
+  scenarios[3] = scenarios[8] = "9, 1, 1";
+  RunSettings settings{.option = 0, .scenarios = scenarios, .modelArguments = "--fail-above 8"};
+  EXPECT_EQ(runProgram({folder.writeSetup(settings)}).exitCode, 0);
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("25 model evaluations, 2 of them failed"));
+
+  settings.scenarios[20] = "9, 1, 1";
+  EXPECT_EQ(runProgram({folder.writeSetup(settings)}).exitCode, 1);
+  EXPECT_EQ(readResults(folder.read("basin.dat")).rows.size(), 22U);
+}
+
+TEST(Refusals, WhatIsMissingIsNamedBeforeAnyModelRun) {
+  const struct {
+    RunSettings settings;
+    const char* message;
+  } cases[] = {{{.templateFile = "model/none.tpl"}, "none.tpl"},
+               {{.simulationFile = "model/none.csv"}, "none.csv"},
+               {{.observationFile = "none.csv"}, "none.csv"},
+               {{.batchFile = "model/none.sh"}, "none.sh"}};
+  for (const auto& c : cases) {
+    const ModelFolder folder;
+    const ProgramResult result = runProgram({folder.writeSetup(c.settings)});
+    EXPECT_EQ(result.exitCode, 1);
+    EXPECT_THAT(result.error, StartsWith("Error"));
+    EXPECT_THAT(result.error, HasSubstr(c.message));
+    EXPECT_THAT(folder.read("basin.log"), EndsWith("\n\n" + result.error));
+    EXPECT_FALSE(folder.has("basin_Optimisation.dat"));
+  }
+}
+
+}  // namespace
+}  // namespace mirevo::testing
