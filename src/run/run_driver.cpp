@@ -11,6 +11,7 @@
 #include "platform/posix_process_launcher.h"
 #include "run/mpi_start.h"
 #include "run/setup_reader.h"
+#include "run/setup_summary.h"
 #include "run/signal_handlers.h"
 #include "run/signal_state.h"
 #include "run/tasks.h"
@@ -63,6 +64,7 @@ int RunDriver::run(const std::string& setupFileName) {
     openRun(setupFileName);
     config_ = readSetupFile(setupFileName, state_.log);
     buildModel();
+    logSetup();
     openResults();
     state_.progress.writeStatus(taskName(config_));
     state_.progress.progressEvaluationLabel(config_.plannedEvaluations());
@@ -114,29 +116,52 @@ void RunDriver::buildModel() {
                                           launcherSettings(config_, filePrefix_));
 }
 
+void RunDriver::logSetup() {
+  state_.log.line("");
+  state_.log.line(setupSummary(config_, parameters_->searchSpace(), parameters_->evaluationOrder()));
+  if (!config_.savedOutputFiles.empty()) {
+    state_.log.warning("SAVE_OUTPUT_FILES: this version does not keep output files of every evaluation");
+  }
+  for (const ParameterTemplate& parameterTemplate : runner_->templates()) {
+    for (const std::string& text : parameterTemplate.narrowPlaceholderWarnings(config_.parameters)) {
+      state_.log.warning(text);
+    }
+  }
+  state_.log.line("");
+}
+
 void RunDriver::openResults() {
   const SearchSpace& space = parameters_->searchSpace();
   const std::string failedRunPath = std::filesystem::path(filePrefix_).replace_filename("calSimErr.dat").string();
   keepEarlierFile(failedRunPath);
   failedRunFile_ = std::make_unique<FailedRunFile>(failedRunPath, config_.setupName, space.names);
 
-  const std::string path = filePrefix_ + std::string(resultFileEnding(config_));
-  if (const std::string kept = keepEarlierFile(path); !kept.empty()) {
-    state_.log.line("The results of the earlier run were kept as " + kept);
-  }
-  ResultColumns columns;
-  columns.parameters = space.names;
-  for (const OutputMeasure& measure : config_.measures) columns.measures.push_back(measure.name);
-  for (const ObjectiveFunction& objective : config_.objectives) columns.objectives.push_back(objective.name);
-  const std::vector<std::string> head{config_.title, fmt::format("Mirevo {}", programVersion()), taskName(config_),
-                                      "Setup file: " + config_.setupFile, "Started: " + dateAndTimeNow()};
-  results_.open(path, head, columns);
-
+  openResultFile();
   reporter_ = std::make_unique<RunReporter>(state_, results_, *failedRunFile_, space);
   failedRunPolicy_.emplace(config_.plannedEvaluations());
   evaluator_ =
       std::make_unique<LocalEvaluator>(*runner_, *reporter_, *failedRunPolicy_, config_.simultaneousSimulations);
   state_.objectiveValues.resize(config_.objectives.size());
+}
+
+void RunDriver::openResultFile() {
+  const std::string_view ending = resultFileEnding(config_);
+  if (ending.empty()) return;
+  const std::string path = filePrefix_ + std::string(ending);
+  if (const std::string kept = keepEarlierFile(path); !kept.empty()) {
+    state_.log.line("The results of the earlier run were kept as " + kept);
+  }
+  ResultColumns columns;
+  columns.parameters = parameters_->searchSpace().names;
+  for (const OutputMeasure& measure : config_.measures) columns.measures.push_back(measure.name);
+  for (const ObjectiveFunction& objective : config_.objectives) columns.objectives.push_back(objective.name);
+  const std::vector<std::string> head{config_.title,
+                                      fmt::format("Mirevo {}", programVersion()),
+                                      taskName(config_),
+                                      fmt::format("Random seed: {}", config_.randomSeed),
+                                      "Setup file: " + config_.setupFile,
+                                      "Started: " + dateAndTimeNow()};
+  results_.open(path, head, columns);
 }
 
 std::vector<std::string> RunDriver::closingLines(std::string_view terminationMessage) const {

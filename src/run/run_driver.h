@@ -35,7 +35,9 @@ class RunDriver final {
  private:
   void openRun(const std::string& setupFileName);
   void buildModel();
+  void logSetup();
   void openResults();
+  void openResultFile();
   /// False, with the system's reason, when the results could not be brought to their end.
   bool closeResults(std::string_view terminationMessage, std::string& reason);
   void finish(std::string_view terminationMessage);

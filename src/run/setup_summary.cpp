@@ -11,35 +11,6 @@
 namespace mirevo {
 namespace {
 
-std::string taskName(const RunConfig& config) {
-  switch (config.simulationOption) {
-    case SimulationOption::scenarioRuns:
-      return config.scenario.scenarioType == 0 ? "Scenario runs: Single run using initial parameter set"
-                                               : "Scenario runs: Multiple runs";
-    case SimulationOption::sensitivityAnalysis:
-      return fmt::format("Sensitivity analysis: Local sensitivity analysis, {} differences",
-                         config.sensitivity.differencing == 1 ? "central" : "forward");
-    case SimulationOption::parameterOptimisation:
-      break;
-    case SimulationOption::uncertaintyAnalysis:
-      return fmt::format("Uncertainty analysis: {} sampling",
-                         config.uncertainty.uncertaintyType == 1 ? "Latin hypercube" : "simple random");
-  }
-  if (config.simulationOption != SimulationOption::parameterOptimisation) return "none";
-  std::string task = "Parameter optimisation: ";
-  switch (config.optimisation.algorithmType) {
-    case AlgorithmType::sce:
-      task += "Shuffled Complex Evolution";
-      break;
-    case AlgorithmType::pse:
-      task += "Population Simplex Evolution";
-      break;
-    case AlgorithmType::dds:
-      return task + "Dynamically Dimensioned Search";
-  }
-  return config.optimisation.useSurrogateModel == 1 ? task + " with surrogate model" : task;
-}
-
 std::string_view transformationName(TransformationType type) {
   switch (type) {
     case TransformationType::none:
@@ -150,6 +121,35 @@ class Summary final {
 };
 
 }  // namespace
+
+std::string taskName(const RunConfig& config) {
+  switch (config.simulationOption) {
+    case SimulationOption::scenarioRuns:
+      return config.scenario.scenarioType == 0 ? "Scenario runs: Single run using initial parameter set"
+                                               : "Scenario runs: Multiple runs";
+    case SimulationOption::sensitivityAnalysis:
+      return fmt::format("Sensitivity analysis: Local sensitivity analysis, {} differences",
+                         config.sensitivity.differencing == 1 ? "central" : "forward");
+    case SimulationOption::parameterOptimisation:
+      break;
+    case SimulationOption::uncertaintyAnalysis:
+      return fmt::format("Uncertainty analysis: {} sampling",
+                         config.uncertainty.uncertaintyType == 1 ? "Latin hypercube" : "simple random");
+  }
+  if (config.simulationOption != SimulationOption::parameterOptimisation) return "none";
+  std::string task = "Parameter optimisation: ";
+  switch (config.optimisation.algorithmType) {
+    case AlgorithmType::sce:
+      task += "Shuffled Complex Evolution";
+      break;
+    case AlgorithmType::pse:
+      task += "Population Simplex Evolution";
+      break;
+    case AlgorithmType::dds:
+      return task + "Dynamically Dimensioned Search";
+  }
+  return config.optimisation.useSurrogateModel == 1 ? task + " with surrogate model" : task;
+}
 
 std::string setupSummary(const RunConfig& config, const SearchSpace& space, std::span<const int> evaluationOrder) {
   Summary summary(config);

@@ -8,6 +8,9 @@
 
 namespace mirevo {
 
+/// The chosen task, "Parameter optimisation: Dynamically Dimensioned Search"; "none" for one that does not exist.
+std::string taskName(const RunConfig& config);
+
 /// What the run is about to do, for the log, several lines without a line end behind the last: task, parameters with
 /// their bounds on the model's and the search's scale, measures, objective functions, evaluations, slots.
 /// `evaluationOrder` holds the 1-based numbers of all parameters in the order in which they get their values.

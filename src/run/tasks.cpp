@@ -84,34 +84,6 @@ std::string runTask(const TaskContext& context) {
   return std::string(kEndOfTask);
 }
 
-std::string taskName(const RunConfig& config) {
-  switch (config.simulationOption) {
-    case SimulationOption::scenarioRuns:
-      return config.scenario.scenarioType == 0 ? "Scenario runs: Single run using initial parameter set"
-                                               : "Scenario runs: Multiple runs";
-    case SimulationOption::sensitivityAnalysis:
-      return "Sensitivity analysis: Local sensitivity analysis";
-    case SimulationOption::parameterOptimisation: {
-      std::string name = "Parameter optimisation";
-      switch (config.optimisation.algorithmType) {
-        case AlgorithmType::sce:
-          name += ": Shuffled Complex Evolution";
-          break;
-        case AlgorithmType::pse:
-          name += ": Population Simplex Evolution";
-          break;
-        case AlgorithmType::dds:
-          name += ": Dynamically Dimensioned Search";
-          break;
-      }
-      return config.optimisation.useSurrogateModel == 1 ? name + " with surrogate model" : name;
-    }
-    case SimulationOption::uncertaintyAnalysis:
-      return "Uncertainty analysis";
-  }
-  return {};
-}
-
 std::string_view resultFileEnding(const RunConfig& config) {
   switch (config.simulationOption) {
     case SimulationOption::scenarioRuns:

@@ -25,10 +25,6 @@ struct TaskContext {
 /// file. Throws FatalError and RunCancelled.
 std::string runTask(const TaskContext& context);
 
-/// The name of the chosen task, "Parameter optimisation: Dynamically Dimensioned Search"; empty for one that does not
-/// exist.
-std::string taskName(const RunConfig& config);
-
 /// The ending of the task's result file, behind the setup's name; empty for a task without one.
 std::string_view resultFileEnding(const RunConfig& config);
 
