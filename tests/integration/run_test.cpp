@@ -52,6 +52,16 @@ TEST(Optimisation, ACalibrationEndsWithItsBestSetInLogResultsAndModelFolder) {
   EXPECT_NEAR(number(folder.read("basin_Process1/parameters.txt").substr(4)), number(table.rows.back()[2]), 1e-6);
 }
 
+TEST(Optimisation, ClosedStandardOutputsDoNotLetMessagesIntoTheResults) {
+  const ModelFolder folder;
+  const std::string setup = folder.writeSetup({.option = 0, .modelArguments = "--fail-above 3"});
+  const std::string command = fmt::format("'{}' '{}' <&- >&- 2>&-", MIREVO_PROGRAM, setup);
+  EXPECT_NE(std::system(command.c_str()), 0);
+  EXPECT_THAT(folder.read("basin.dat"), StartsWith("# Small test basin\n"));
+  EXPECT_THAT(folder.read("basin.dat"),
+              EndsWith("\n# Error: Unable to continue. No of failed simulations too high.\n"));
+}
+
 TEST(Optimisation, ASecondRunGivesTheSameBitsAndKeepsTheFilesOfTheFirst) {
   const ModelFolder folder;
   const std::string setup = folder.writeSetup({.maxEvaluations = 30});
