@@ -130,6 +130,8 @@ bool PosixProcessLauncher::initialise(const LauncherSettings& settings) {
   haltProcesses();
   closeDescriptors();
   slots_.clear();
+  // Where the program was started with this signal ignored, the kernel would forget how its children ended.
+  ::signal(SIGCHLD, SIG_DFL);
   graceSeconds_ = settings.graceSeconds;
   try {
     std::vector<std::vector<std::string>> arguments;
@@ -260,7 +262,13 @@ void PosixProcessLauncher::isExecuting(int slotNumber, std::int32_t& executing, 
     // Looked at and not reaped: while it is there its number cannot become another group's.
     siginfo_t ended{};
     const int result = ::waitid(P_PIDFD, static_cast<id_t>(slot.pidfd), &ended, WEXITED | WNOHANG | WNOWAIT);
-    if (result == 0 && ended.si_pid != 0) finishItem(slot, ended.si_code, ended.si_status);
+    if (result == 0 && ended.si_pid != 0) {
+      finishItem(slot, ended.si_code, ended.si_status);
+    } else if (result < 0 && errno == ECHILD) {  // something else in this program has reaped it
+      endRestOfGroup(slot);
+      slot.failure = {BatchFailure::Kind::exitCode, -1,
+                      baseName(slot.commands[slot.item].file()) + " has ended, but how could not be learned"};
+    }
   }
   executing = slot.pidfd >= 0 ? 1 : 0;
   status = static_cast<std::int32_t>(slot.failure.kind == BatchFailure::Kind::none ? BatchStatus::succeeded

@@ -185,7 +185,8 @@ void makeProcessFolder(const std::string& source, const std::string& target, std
     made.push_back({target + below, {}});
     if (::stat((source + below).c_str(), &made.back().status) != 0) fail("look at", source + below, errno);
     for (const std::string& name : names) {
-      const std::string path = below + "/" + name;
+      std::string path = below;
+      path.append("/").append(name);
       const std::string from = source + path;
       const std::string to = target + path;
       const struct stat status = statusOf(from);

@@ -66,7 +66,7 @@ void ProcessGroupTable::signalAll(int signal) const noexcept {
   }
 }
 
-void ProcessGroupTable::makeCurrent() noexcept {
+void ProcessGroupTable::makeCurrent() const noexcept {
   currentTable.store(this);
 }
 

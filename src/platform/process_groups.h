@@ -25,7 +25,7 @@ class ProcessGroupTable final {
   void signalAll(int signal) const noexcept;
 
   /// Makes this the table that haltProcessesFromSignal() acts on, until it is destroyed.
-  void makeCurrent() noexcept;
+  void makeCurrent() const noexcept;
 
  private:
   std::span<std::atomic<pid_t>> entries_;

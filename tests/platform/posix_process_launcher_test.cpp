@@ -149,6 +149,20 @@ TEST_F(PosixProcessLauncherTest, GivesTheBatchAPlainSurrounding) {
   EXPECT_EQ(ids.substr(0, ids.find('\n')) + "\n", ids.substr(ids.find('\n') + 1));
 }
 
+// Some job starters leave SIGCHLD ignored; the kernel then reaps children itself.
+TEST_F(PosixProcessLauncherTest, ExitCodesAreKnownWhereChildrenAreIgnored) {
+  folder_.write("base/run.sh", "exit 6\n");
+  addItem("run.sh");
+  ::signal(SIGCHLD, SIG_IGN);
+  initialise();
+  EXPECT_EQ(run(), BatchStatus::failed);
+  EXPECT_EQ(launcher_.failure(1).code, 6);
+  ::signal(SIGCHLD, SIG_IGN);  // and by something that this program uses, while it runs
+  EXPECT_EQ(run(), BatchStatus::failed);
+  EXPECT_EQ(launcher_.failure(1).detail, "run.sh has ended, but how could not be learned");
+  ::signal(SIGCHLD, SIG_DFL);
+}
+
 TEST_F(PosixProcessLauncherTest, ItemsRunOneAfterAnotherUntilOneFails) {
   folder_.write("base/first.sh", "echo first; sleep 0.05; echo one >order.txt\n");
   folder_.write("base/second.sh", "echo second; echo two >>order.txt; exit $1\n");

@@ -1,0 +1,44 @@
+#pragma once
+
+#include <memory>
+#include <string>
+
+#include "evaluation/local_evaluator.h"
+#include "platform/posix_process_launcher.h"
+
+namespace mirevo::bench {
+
+/// A calibration of the test model (365 values, two parameters) in a folder of its own, which can be evaluated in three
+/// ways over the same process folders' content.
+class Calibration final {
+ public:
+  /// `fixedParameters` are further lines of the model's parameter file.
+  Calibration(std::string folder, int slotCount, const std::string& fixedParameters);
+  ~Calibration();
+  Calibration(const Calibration&) = delete;
+  Calibration& operator=(const Calibration&) = delete;
+
+  /// Seconds for that many runs of the batch by posix_spawn and wait alone.
+  double runBare(int count);
+  /// Seconds for that many evaluations by a LocalEvaluator in this process, in one batch.
+  double evaluate(int count);
+  /// Seconds per evaluation of the built program, its start and end included: a search by DDS in one slot (its final
+  /// run counted), an uncertainty analysis in several.
+  double runProgram(int count);
+
+ private:
+  void writeModel(const std::string& fixedParameters) const;
+  ModelDescription describe() const;
+
+  std::string folder_;
+  int slotCount_;
+  PosixProcessLauncher launcher_;
+  std::unique_ptr<EvaluationObserver> observer_;
+  FailedRunPolicy failedRuns_{10};
+  std::unique_ptr<ParameterModel> parameters_;
+  std::unique_ptr<ObjectiveAggregator> aggregator_;
+  std::unique_ptr<ModelRunner> runner_;
+  std::unique_ptr<LocalEvaluator> evaluator_;
+};
+
+}  // namespace mirevo::bench

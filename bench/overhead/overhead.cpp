@@ -1,0 +1,94 @@
+// What the program adds to a model run: wall time per evaluation, of the evaluation loop in this process and of the
+// built program from start to end, against a bare loop that does posix_spawn and wait on the same batch; how well slots
+// are kept busy; and whether an evaluation costs more the longer a run goes on.
+//
+//   overhead [FOLDER]...     folders to work in, one a file system to measure (default: /dev/shm and the temporary one)
+//
+// The three take turns in short rounds, so that what else the machine does strikes all; each figure is the median of
+// its rounds, a ratio the median of the rounds' ratios. The model is the small one of the tests: it reads its parameter
+// file and writes 365 values. In the bare loop it truncates the file that its last run wrote, which the program has
+// removed.
+#include <algorithm>
+#include <filesystem>
+#include <unistd.h>
+#include <vector>
+
+#include <fmt/format.h>
+
+#include "calibration.h"
+#include "common/fatal_error.h"
+
+namespace {
+
+using mirevo::bench::Calibration;
+
+constexpr int kRounds = 11;
+constexpr int kRunsARound = 200;
+
+double median(std::vector<double> values) {
+  std::sort(values.begin(), values.end());
+  return values[values.size() / 2];
+}
+
+void compareWithBareLoop(const std::string& folder) {
+  for (const int slotCount : {1, 2, 4}) {
+    Calibration calibration(folder, slotCount, "");
+    std::vector<double> bare, loop, program, loopRatio, programRatio;
+    calibration.runBare(kRunsARound);
+    for (int round = 0; round < kRounds; ++round) {
+      bare.push_back(calibration.runBare(kRunsARound) / kRunsARound * 1e6);
+      loop.push_back(calibration.evaluate(kRunsARound) / kRunsARound * 1e6);
+      program.push_back(calibration.runProgram(kRunsARound) * 1e6);
+      loopRatio.push_back(loop.back() / bare.back());
+      programRatio.push_back(program.back() / bare.back());
+    }
+    fmt::print("{:30} {:5} {:8.0f} {:8.0f} {:8.0f} {:10.2f} {:10.2f}\n", folder, slotCount, median(bare), median(loop),
+               median(program), median(loopRatio), median(programRatio));
+  }
+}
+
+void keepSlotsBusy(const std::string& folder) {
+  constexpr int kRuns = 100;
+  constexpr double kModelSeconds = 0.2;
+  fmt::print("\n{} runs of a model that sleeps {} ms: 1 is no time lost\n{:>5} {:>8} {:>10} {:>10}\n", kRuns,
+             1000 * kModelSeconds, "slots", "ideal s", "loop", "program");
+  for (const int slotCount : {1, 2, 4, 8}) {
+    Calibration calibration(folder, slotCount, fmt::format("sleep-ms = {}\n", 1000 * kModelSeconds));
+    const double ideal = kModelSeconds * ((kRuns + slotCount - 1) / slotCount);
+    const double loop = calibration.evaluate(kRuns);
+    const double program = calibration.runProgram(kRuns) * kRuns;
+    fmt::print("{:5} {:8.2f} {:10.3f} {:10.3f}\n", slotCount, ideal, ideal / loop, ideal / program);
+  }
+}
+
+void lookForGrowth(const std::string& folder) {
+  Calibration calibration(folder, 1, "");
+  fmt::print("\nus per evaluation as the run goes on, beside the bare loop at the time\n{:>14} {:>8} {:>8}\n",
+             "evaluations", "loop", "bare");
+  int done = 0;
+  for (const int until : {100, 1000, 2000, 4000, 6000, 8000, 10000}) {
+    const double loop = calibration.evaluate(until - done) / (until - done);
+    const double bare = calibration.runBare(kRunsARound) / kRunsARound;
+    fmt::print("{:5} to {:5} {:8.0f} {:8.0f}\n", done + 1, until, loop * 1e6, bare * 1e6);
+    done = until;
+  }
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  std::vector<std::string> folders(argv + 1, argv + argc);
+  if (folders.empty()) folders = {"/dev/shm", std::filesystem::temp_directory_path().string()};
+  for (std::string& folder : folders) folder += fmt::format("/mirevo_overhead_{}", ::getpid());
+  try {
+    fmt::print("us per evaluation, {} a round\n{:30} {:>5} {:>8} {:>8} {:>8} {:>10} {:>10}\n", kRunsARound, "folder",
+               "slots", "bare", "loop", "program", "loop/bare", "prog/bare");
+    for (const std::string& folder : folders) compareWithBareLoop(folder);
+    keepSlotsBusy(folders.front());
+    lookForGrowth(folders.front());
+  } catch (const mirevo::FatalError& error) {
+    fmt::print(stderr, "{}\n{}\n", error.message(), error.detail());
+    return 1;
+  }
+  return 0;
+}
