@@ -35,7 +35,7 @@ std::string inside(std::string_view path, std::string_view name) {
 
 }  // namespace
 
-SetupFile::SetupFile(std::string fileName, std::string folder, std::string_view text, RunLog& log)
+SetupFile::SetupFile(const std::string& fileName, std::string folder, std::string_view text, RunLog& log)
     : document_(parsed(fileName, text)), folder_(std::move(folder)), log_(log) {}
 
 SetupSection SetupFile::target() {

@@ -18,7 +18,7 @@ class SetupFile final {
  public:
   /// `fileName` is the name that messages show, `folder` the absolute folder against which file names are resolved.
   /// Throws FatalError with "Error: Unable to open " and the name for a text that is no KDX.
-  SetupFile(std::string fileName, std::string folder, std::string_view text, RunLog& log);
+  SetupFile(const std::string& fileName, std::string folder, std::string_view text, RunLog& log);
 
   /// The target MIREVO_PARAMETERS. Sections of it may refer to this object, which must outlive them.
   SetupSection target();

@@ -267,6 +267,7 @@ void SetupReader::connectMeasures(const std::vector<SetupSection>& measureSectio
           fmt::format("no objective function is called {}{}", quotedForMessage(measure.functionName),
                       nearest ? fmt::format(", did you mean {}?", quotedForMessage(*nearest)) : ""));
     }
+    // cppcheck-suppress derefInvalidIteratorRedundantCheck ; refuse() does not return
     config_.objectives[found->second].measures.push_back(i);
   }
   for (std::size_t i = 0; i < config_.objectives.size(); ++i) {

@@ -7,6 +7,11 @@
 #include "common/text.h"
 #include "platform/kdx_value.h"
 
+// GCC 12 under the sanitizers takes the alternatives of a variant inside a variant for uninitialised.
+#if defined(__GNUC__) && !defined(__clang__)
+#pragma GCC diagnostic ignored "-Wmaybe-uninitialized"
+#endif
+
 namespace mirevo {
 namespace {
 

@@ -19,7 +19,7 @@ class EntryCheck final {
     for (const KdxKeyword& keyword : node.keywords()) checkKeyword(node, keyword, pattern);
     for (const auto& section : node.sections()) {
       std::string name = itemPattern(section->name());
-      const std::string path = pattern.empty() ? name : pattern + "/" + name;
+      const std::string path = pattern.empty() ? name : fmt::format("{}/{}", pattern, name);
       const bool isFirst = node.section(section->name()) == section.get();
       if (findSection(path) == nullptr) {
         warn(section->position(), "section", section->name(),
