@@ -1,0 +1,59 @@
+#pragma once
+
+#include <cstddef>
+#include <span>
+#include <string>
+#include <vector>
+
+#include "parameters/search_space.h"
+
+namespace mirevo {
+
+/// A model linearised at its parameter values: n observations, p parameters.
+struct LinearisedModel {
+  std::vector<double> residuals;              ///< r, simulated minus observed, n; rows with a NaN are left out
+  std::vector<double> weights;                ///< the diagonal of W, n; all 1 when empty
+  std::vector<std::vector<double>> jacobian;  ///< J by columns: p columns of n derivatives on the search scale
+};
+
+/// A parameter without a variance, and why.
+struct LeftOutParameter {
+  std::size_t index = 0;  ///< 0-based
+  std::string reason;
+};
+
+/// The covariance matrix s^2 (J'WJ)^-1 of the parameters that have one, with s^2 = r'Wr / (n - p); search scale.
+struct ParameterCovariance {
+  std::vector<std::size_t> kept;  ///< k parameters, ascending; the matrices and vectors below have their order
+  std::vector<LeftOutParameter> leftOut;
+  std::size_t observationCount = 0;  ///< n, rows with a NaN not counted
+  std::size_t degreesOfFreedom = 0;  ///< n - k
+  double errorVariance = 0.0;        ///< s^2; NaN, with all that follows, when there is no degree of freedom
+  std::vector<std::vector<double>> covariance;
+  std::vector<std::vector<double>> correlation;
+  std::vector<double> standardDeviations;
+  double tQuantile = 0.0;  ///< 97.5 % quantile of Student's t
+};
+
+/// By Cholesky factorisation of the scaled matrix (DPOTRF, DPOTRI). A parameter whose column is zero or not finite, or
+/// depends on those of the parameters before it, is left out with its reason.
+ParameterCovariance parameterCovariance(const LinearisedModel& model);
+
+/// One parameter on the model scale. The limits are the search scale's, transformed; the standard deviation is carried
+/// over by the derivative of the transformation (delta method).
+struct ParameterLimits {
+  double value = 0.0;
+  double standardDeviation = 0.0;
+  double lower = 0.0;  ///< 95 % limits
+  double upper = 0.0;
+};
+
+/// One entry a kept parameter; `set` is the set at which the model was linearised, on the search scale.
+std::vector<ParameterLimits> parameterLimits(const ParameterCovariance& covariance, const SearchSpace& space,
+                                             std::span<const double> set);
+
+/// The covariance analysis as lines of text for the log, with a warning for each |r| > 0.95.
+std::vector<std::string> formatCovariance(const ParameterCovariance& covariance, const SearchSpace& space,
+                                          std::span<const double> set);
+
+}  // namespace mirevo
