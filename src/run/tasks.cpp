@@ -2,6 +2,7 @@
 
 #include <fmt/format.h>
 
+#include "algorithms/uncertainty.h"
 #include "algorithms/uniform_generator.h"
 #include "common/fatal_error.h"
 #include "common/text.h"
@@ -20,11 +21,15 @@ void logValues(RunLog& log, std::string_view heading, std::span<const std::strin
   }
 }
 
+std::vector<std::string> objectiveNames(const RunConfig& config) {
+  std::vector<std::string> names;
+  for (const ObjectiveFunction& objective : config.objectives) names.push_back(objective.name);
+  return names;
+}
+
 void logBestSet(const TaskContext& context, const ParameterSet& best, const EvaluationResult& result) {
-  std::vector<std::string> objectives;
-  for (const ObjectiveFunction& objective : context.config.objectives) objectives.push_back(objective.name);
   logValues(context.log, "Best parameter set:", context.space.names, ToModelScale(context.space, best));
-  logValues(context.log, "Objective functions:", objectives, result.objectiveValues);
+  logValues(context.log, "Objective functions:", objectiveNames(context.config), result.objectiveValues);
   context.log.line(fmt::format("Aggregate: {}", formatReal(result.aggregate)));
 }
 
@@ -68,6 +73,22 @@ std::string runSensitivity(const TaskContext& context) {
   return std::string(kEndOfTask);
 }
 
+std::string runUncertainty(const TaskContext& context) {
+  const UncertaintyConfig& config = context.config.uncertainty;
+  UncertaintySettings settings{config.uncertaintyType, config.sampleSize, {}};
+  for (const UncertaintyParameter& parameter : config.parameters) {
+    settings.parameters.push_back({parameter.mean, parameter.standardDeviation});
+  }
+  const UncertaintyOutcome outcome =
+      uncertaintyAnalysis(settings, context.config.randomSeed, context.evaluator,
+                          [&context](std::string_view text) { context.log.warning(text); });
+  AnalysisNames names{context.space.names, {}, objectiveNames(context.config)};
+  for (const OutputMeasure& measure : context.config.measures) names.measures.push_back(measure.name);
+  context.log.line("");
+  for (const std::string& line : formatUncertainty(summariseUncertainty(outcome), names)) context.log.line(line);
+  return std::string(kEndOfTask);
+}
+
 }  // namespace
 
 std::string runTask(const TaskContext& context) {
@@ -79,7 +100,7 @@ std::string runTask(const TaskContext& context) {
     case SimulationOption::parameterOptimisation:
       return runOptimisation(context);
     case SimulationOption::uncertaintyAnalysis:
-      fatalError("Error: Uncertainty analysis is not available in this version");
+      return runUncertainty(context);
   }
   return std::string(kEndOfTask);
 }

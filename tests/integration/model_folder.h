@@ -14,7 +14,7 @@ namespace mirevo::testing {
 /// The settings of a run with the small test model; what a test does not name is a short, sound calibration.
 struct RunSettings {
   int option = 2;
-  int maxEvaluations = 40;
+  int maxEvaluations = 40;  ///< also the sample size of an uncertainty analysis
   int seed = 1;
   std::vector<std::string> scenarios = {};  ///< values of a, b and c, "1, 2, 3"; none: a single run
   int slots = 1;
@@ -164,18 +164,31 @@ class ModelFolder : public TemporaryFolder {
     [/DDS_CONTROL_PARAMETERS]
     [INITIAL_SAMPLE]
       Include_Initial_Parameters = 1
-      Random_Seed = {}
+      Random_Seed = {0}
       Initial_Sample_Generation = 0
       Initial_Sample_File_Name = ''
     [/INITIAL_SAMPLE]
     [STOPPING_CRITERIA]
-      Max_No_Evaluations = {}
+      Max_No_Evaluations = {1}
       No_Loops_Convergence = 5
       Min_Change = 0.001
     [/STOPPING_CRITERIA]
   [/OPTIMISATION_ALGORITHM]
+  [UNCERTAINTY_ESTIMATION]
+    Uncertainty_Type = 1
+    Sample_Size = {1}
+    Random_Seed = {0}
+    [PARAMETER_1]
+      Mean_Value = 5.0
+      Standard_Deviation = 0.5
+    [/PARAMETER_1]
+    [PARAMETER_2]
+      Mean_Value = 2.0
+      Standard_Deviation = 0.1
+    [/PARAMETER_2]
+  [/UNCERTAINTY_ESTIMATION]
   [SimultaneousSimulations]
-    NoSimultaneousSim = {}
+    NoSimultaneousSim = {2}
     UseSingleThread = 0
   [/SimultaneousSimulations]
 [/MIREVO_PARAMETERS]

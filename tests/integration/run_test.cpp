@@ -101,6 +101,19 @@ TEST(Scenarios, RunsThatEndInAnotherOrderStandInTheirOwnInTheResults) {
   EXPECT_FALSE(folder.has("basin._spi_"));
 }
 
+TEST(Uncertainty, TheSampleIsTheSameWithOneSlotAndWithThree) {
+  const ModelFolder folder;
+  ASSERT_EQ(runProgram({folder.writeSetup({.option = 3})}).exitCode, 0);
+  ASSERT_EQ(runProgram({folder.writeSetup({.option = 3, .slots = 3})}).exitCode, 0);
+  const ResultTable table = readResults(folder.read("basin.dat"));
+  EXPECT_EQ(table.rows, readResults(folder.read("basin.1.dat")).rows);
+  ASSERT_EQ(table.rows.size(), 41U);
+  double sum = 0.0;
+  for (std::size_t i = 1; i < table.rows.size(); ++i) sum += number(table.rows[i][2]);
+  EXPECT_NEAR(sum / 40.0, 5.0, 0.05);  // Latin hypercube: the mean of the sample is close to that of the distribution
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("40 model evaluations, 0 of them failed"));
+}
+
 TEST(FailedRuns, ASingleRunThatFailsEndsTheRunWithTheReason) {
   const ModelFolder folder;
   const ProgramResult result = runProgram({folder.writeSetup({.option = 0, .modelArguments = "--fail-above 3"})});
