@@ -24,6 +24,7 @@ using mirevo::bench::Calibration;
 
 constexpr int kRounds = 11;
 constexpr int kRunsARound = 200;
+constexpr int kProgramRuns = 600;  ///< more, as the start and end of the program count
 
 double median(std::vector<double> values) {
   std::sort(values.begin(), values.end());
@@ -38,7 +39,7 @@ void compareWithBareLoop(const std::string& folder) {
     for (int round = 0; round < kRounds; ++round) {
       bare.push_back(calibration.runBare(kRunsARound) / kRunsARound * 1e6);
       loop.push_back(calibration.evaluate(kRunsARound) / kRunsARound * 1e6);
-      program.push_back(calibration.runProgram(kRunsARound) * 1e6);
+      program.push_back(calibration.runProgram(kProgramRuns) * 1e6);
       loopRatio.push_back(loop.back() / bare.back());
       programRatio.push_back(program.back() / bare.back());
     }
@@ -81,8 +82,8 @@ int main(int argc, char** argv) {
   if (folders.empty()) folders = {"/dev/shm", std::filesystem::temp_directory_path().string()};
   for (std::string& folder : folders) folder += fmt::format("/mirevo_overhead_{}", ::getpid());
   try {
-    fmt::print("us per evaluation, {} a round\n{:30} {:>5} {:>8} {:>8} {:>8} {:>10} {:>10}\n", kRunsARound, "folder",
-               "slots", "bare", "loop", "program", "loop/bare", "prog/bare");
+    fmt::print("us per evaluation, {} a round ({} of the program)\n{:30} {:>5} {:>8} {:>8} {:>8} {:>10} {:>10}\n",
+               kRunsARound, kProgramRuns, "folder", "slots", "bare", "loop", "program", "loop/bare", "prog/bare");
     for (const std::string& folder : folders) compareWithBareLoop(folder);
     keepSlotsBusy(folders.front());
     lookForGrowth(folders.front());
