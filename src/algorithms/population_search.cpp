@@ -92,6 +92,21 @@ ParameterSet PopulationSearch::clampedToBounds(ParameterSet set) const {
   return set;
 }
 
+ParameterSet PopulationSearch::reflectedAtBounds(ParameterSet set) const {
+  for (std::size_t j = 0; j < set.size(); ++j) {
+    const double lower = problem_.bounds.lower[j];
+    const double upper = problem_.bounds.upper[j];
+    if (set[j] < lower) {
+      set[j] = 2.0 * lower - set[j];
+      if (set[j] > upper) set[j] = lower;
+    } else if (set[j] > upper) {
+      set[j] = 2.0 * upper - set[j];
+      if (set[j] < lower) set[j] = upper;
+    }
+  }
+  return set;
+}
+
 ParameterSet PopulationSearch::drawFrom(const Box& box) {
   ParameterSet set(box.lower.size());
   for (std::size_t j = 0; j < set.size(); ++j) {

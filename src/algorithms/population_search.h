@@ -61,6 +61,9 @@ class PopulationSearch : public SearchAlgorithm {
   bool isWithinBounds(const ParameterSet& set) const;
   /// Puts a point that rounding may have carried past a bound back on it.
   ParameterSet clampedToBounds(ParameterSet set) const;
+  /// Reflects coordinates outside the bounds at them; what then lies beyond the opposite bound is put on the bound that
+  /// was violated first.
+  ParameterSet reflectedAtBounds(ParameterSet set) const;
   /// A uniformly random point of a box.
   ParameterSet drawFrom(const Box& box);
   /// Places of `count` distinct members out of `size` that are sorted best first, drawn one after the other with the

@@ -4,7 +4,6 @@
 #include <utility>
 
 namespace mirevo {
-
 Sce::Sce(const SceSettings& settings, const SimplexSettings& simplex, SearchProblem problem)
     : PopulationSearch(std::move(problem)), settings_(settings), simplex_(simplex) {}
 
@@ -68,19 +67,22 @@ void Sce::tryProposals(Proposal propose, Acceptance acceptance) {
   for (std::size_t i = 0; i < proposers.size(); ++i) {
     Individual& worst = proposers[i]->points[proposers[i]->worst];
     if (!results[i]) continue;
-    if (acceptance == Acceptance::whenBetter && !isBetter(results[i]->aggregate, worst.value())) continue;
+    const bool isTakenAnyway = acceptance == Acceptance::always && isUsable(*results[i]);
+    if (!isTakenAnyway && !isBetter(results[i]->aggregate, worst.value())) continue;
     worst = {std::move(proposals[i]), std::move(*results[i])};
     proposers[i]->isMoved = true;
   }
 }
 
 ParameterSet Sce::reflection(const Complex& complex) {
-  ParameterSet point = pointOnRay(complex.centroid, complex.points[complex.worst].set, -1.0);
+  const double factor = reflectionFactor(bounds().size());
+  ParameterSet point = pointOnRay(complex.centroid, complex.points[complex.worst].set, -factor);
   return isWithinBounds(point) ? point : mutation(complex);
 }
 
 ParameterSet Sce::contraction(const Complex& complex) {
-  return clampedToBounds(pointOnRay(complex.centroid, complex.points[complex.worst].set, 0.5));
+  const double factor = contractionFactor(bounds().size());
+  return clampedToBounds(pointOnRay(complex.centroid, complex.points[complex.worst].set, factor));
 }
 
 ParameterSet Sce::mutation(const Complex& complex) {

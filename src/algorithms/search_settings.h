@@ -32,8 +32,8 @@ struct SceSettings {
 
 struct PseSettings {
   std::int32_t populationSize = 50;
-  double reflectionProbability = 0.6;
-  double contractionProbability = 0.3;
+  double reflectionProbability = 0.5;
+  double contractionProbability = 0.2;  ///< what is left to 1 is the probability of a mutation
 };
 
 struct DdsSettings {
