@@ -1,0 +1,46 @@
+#pragma once
+
+#include <functional>
+#include <utility>
+#include <vector>
+
+#include "evaluation/evaluator.h"
+
+namespace mirevo::testing {
+
+/// Evaluates a function instead of a model, and keeps every batch for the test to look at.
+class FunctionEvaluator final : public Evaluator {
+ public:
+  using Function = std::function<EvaluationResult(const ParameterSet&)>;
+
+  explicit FunctionEvaluator(Function function) : function_(std::move(function)) {}
+
+  std::vector<EvaluationResult> evaluateParameterSets(std::span<const ParameterSet> sets, DispatchMode) override {
+    batches.emplace_back(sets.begin(), sets.end());
+    std::vector<EvaluationResult> results;
+    for (const ParameterSet& set : sets) {
+      results.push_back(function_(set));
+      results.back().number = ++evaluationCount;
+    }
+    return results;
+  }
+  void settleAggregates(std::span<EvaluationResult> sample) override { settledSizes.push_back(sample.size()); }
+
+  std::vector<std::vector<ParameterSet>> batches;
+  std::vector<std::size_t> settledSizes;
+  int evaluationCount = 0;
+
+ private:
+  Function function_;
+};
+
+/// A result that holds one value as measure, objective function and aggregate.
+inline EvaluationResult resultOf(double value) {
+  EvaluationResult result;
+  result.measureValues = {value};
+  result.objectiveValues = {value};
+  result.aggregate = value;
+  return result;
+}
+
+}  // namespace mirevo::testing
