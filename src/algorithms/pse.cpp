@@ -43,14 +43,20 @@ void Pse::makeLoop() {
 void Pse::makeBatch(std::size_t count) {
   std::vector<Offspring> offspring;
   std::vector<ParameterSet> proposals;
-  for (std::size_t i = 0; i < count; ++i) {
+  for (std::size_t i = 0; i < count * proposalsPerRun(); ++i) {
     offspring.push_back(makeOffspring());
     proposals.push_back(offspring.back().set);
   }
+  const std::vector<std::size_t> chosen = mostPromising(proposals, count);
+  for (std::size_t i = 0; i < chosen.size(); ++i) {
+    offspring[i] = offspring[chosen[i]];
+    proposals[i] = offspring[i].set;
+  }
+  proposals.resize(chosen.size());
   std::vector<std::optional<EvaluationResult>> results = evaluate(proposals);
 
   std::vector<bool> isReplaced(population_.size(), false);
-  for (std::size_t i = 0; i < count; ++i) {
+  for (std::size_t i = 0; i < proposals.size(); ++i) {
     if (!results[i]) continue;
     const std::size_t place = offspring[i].parent;
     Individual& parent = population_[place];

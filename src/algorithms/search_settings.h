@@ -41,7 +41,7 @@ struct DdsSettings {
 };
 
 struct SurrogateSettings {
-  std::int32_t samplingRate = 50;       ///< per cent of the proposals that the model evaluates
+  std::int32_t samplingRate = 50;  ///< per cent of the proposals that the model evaluates
   std::int32_t neighbourhoodSize = 100;
   std::int32_t modelType = 0;           ///< 0 quadratic polynomial, 1 Gaussian process
   std::int32_t initialGenerations = 5;  ///< loops evaluated by the model alone
