@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <numeric>
 
 namespace mirevo {
 
@@ -32,18 +33,36 @@ double populationSpread(const Population& population, int parameterCount) {
   return sum / parameterCount;
 }
 
+bool isUsable(const EvaluationResult& result) {
+  return result.ok() && !std::isnan(result.aggregate);
+}
+
 Box boundingBox(const Population& population) {
+  std::vector<std::size_t> places(population.size());
+  std::iota(places.begin(), places.end(), std::size_t{0});
+  return places.empty() ? Box{} : boundingBox(population, places);
+}
+
+Box boundingBox(const Population& population, std::span<const std::size_t> places) {
   Box box;
-  if (population.empty()) return box;
-  box.lower = population.front().set;
-  box.upper = population.front().set;
-  for (const Individual& individual : population) {
-    for (std::size_t j = 0; j < individual.set.size(); ++j) {
-      box.lower[j] = std::min(box.lower[j], individual.set[j]);
-      box.upper[j] = std::max(box.upper[j], individual.set[j]);
+  box.lower = population[places.front()].set;
+  box.upper = box.lower;
+  for (const std::size_t place : places) {
+    const ParameterSet& set = population[place].set;
+    for (std::size_t j = 0; j < set.size(); ++j) {
+      box.lower[j] = std::min(box.lower[j], set[j]);
+      box.upper[j] = std::max(box.upper[j], set[j]);
     }
   }
   return box;
+}
+
+double reflectionFactor(std::size_t n) {
+  return std::min(1.0, 0.75 + 0.5 / static_cast<double>(n));
+}
+
+double contractionFactor(std::size_t n) {
+  return 0.45 - 0.1 / static_cast<double>(n);
 }
 
 std::vector<double> centroid(const Population& population, std::span<const std::size_t> places) {

@@ -23,6 +23,9 @@ using Population = std::vector<Individual>;
 /// Whether objective value `a` is strictly better (smaller) than `b`. Not-a-number is worse than every number.
 bool isBetter(double a, double b);
 
+/// Whether a result says anything about its point: the evaluation did not fail and its value is a number.
+bool isUsable(const EvaluationResult& result);
+
 /// Sorts best first, not-a-number last; individuals of equal value keep their order.
 void sortBestFirst(Population& population);
 
@@ -40,11 +43,17 @@ struct Box {
   std::vector<double> upper;
 };
 Box boundingBox(const Population& population);
+/// The box of the members at `places` (at least one).
+Box boundingBox(const Population& population, std::span<const std::size_t> places);
 
 /// The centroid of the members at `places` (at least one).
 std::vector<double> centroid(const Population& population, std::span<const std::size_t> places);
 
 /// g + factor·(u − g): with factor −1 the reflection of u through g, with 1/2 the point half-way between them.
 ParameterSet pointOnRay(std::span<const double> g, std::span<const double> u, double factor);
+
+/// How far SCE and PSE reflect a point through the centroid and contract it towards the centroid, for n parameters.
+double reflectionFactor(std::size_t n);
+double contractionFactor(std::size_t n);
 
 }  // namespace mirevo

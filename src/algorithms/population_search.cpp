@@ -3,9 +3,11 @@
 #include <algorithm>
 #include <cassert>
 #include <cmath>
+#include <numeric>
 #include <utility>
 
 #include "algorithms/initial_sample.h"
+#include "algorithms/proposal_selector.h"
 
 namespace mirevo {
 
@@ -29,6 +31,7 @@ SearchStatus PopulationSearch::initialise() {
       drawInitialSample(problem_.initialSample, problem_.givenSample, problem_.bounds, count, problem_.random);
   std::vector<EvaluationResult> results = run(sample, DispatchMode::task);
   problem_.evaluator.settleAggregates(results);
+  for (std::size_t i = 0; i < count && problem_.selector; ++i) problem_.selector->note(sample[i], results[i]);
   population_.clear();
   population_.reserve(2 * count);
   for (std::size_t i = 0; i < count; ++i) {
@@ -73,9 +76,26 @@ std::vector<std::optional<EvaluationResult>> PopulationSearch::evaluate(std::spa
   std::vector<std::optional<EvaluationResult>> results(proposals.size());
   const int left = std::max(0, problem_.stopping.maxEvaluations - summary_.evaluationCount);
   const std::size_t count = std::min(proposals.size(), static_cast<std::size_t>(left));
-  std::vector<EvaluationResult> made = run(proposals.first(count), DispatchMode::task);
+  const DispatchMode mode = isSelecting() ? DispatchMode::surrogateSelected : DispatchMode::task;
+  std::vector<EvaluationResult> made = run(proposals.first(count), mode);
+  for (std::size_t i = 0; i < made.size() && problem_.selector; ++i) problem_.selector->note(proposals[i], made[i]);
   for (std::size_t i = 0; i < made.size(); ++i) results[i] = std::move(made[i]);
   return results;
+}
+
+bool PopulationSearch::isSelecting() const {
+  return problem_.selector != nullptr && problem_.selector->isActive(summary_.loopCount);
+}
+
+std::size_t PopulationSearch::proposalsPerRun() const {
+  return isSelecting() ? problem_.selector->proposalsPerRun() : 1;
+}
+
+std::vector<std::size_t> PopulationSearch::mostPromising(std::span<const ParameterSet> proposals, std::size_t count) {
+  if (isSelecting()) return problem_.selector->select(proposals, count);
+  std::vector<std::size_t> places(std::min(count, proposals.size()));
+  std::iota(places.begin(), places.end(), std::size_t{0});
+  return places;
 }
 
 bool PopulationSearch::isWithinBounds(const ParameterSet& set) const {
@@ -88,6 +108,21 @@ bool PopulationSearch::isWithinBounds(const ParameterSet& set) const {
 ParameterSet PopulationSearch::clampedToBounds(ParameterSet set) const {
   for (std::size_t j = 0; j < set.size(); ++j) {
     set[j] = std::clamp(set[j], problem_.bounds.lower[j], problem_.bounds.upper[j]);
+  }
+  return set;
+}
+
+ParameterSet PopulationSearch::reflectedAtBounds(ParameterSet set) const {
+  for (std::size_t j = 0; j < set.size(); ++j) {
+    const double lower = problem_.bounds.lower[j];
+    const double upper = problem_.bounds.upper[j];
+    if (set[j] < lower) {
+      set[j] = 2.0 * lower - set[j];
+      if (set[j] > upper) set[j] = lower;
+    } else if (set[j] > upper) {
+      set[j] = 2.0 * upper - set[j];
+      if (set[j] < lower) set[j] = upper;
+    }
   }
   return set;
 }

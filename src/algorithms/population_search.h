@@ -52,8 +52,13 @@ class PopulationSearch : public SearchAlgorithm {
   virtual void makeLoop() = 0;
 
   /// Evaluates proposals in one batch. The results stand in the order of the proposals; nothing stands where a proposal
-  /// was not run, as the budget is used up or the surrogate model has passed it over.
+  /// was not run as the budget is used up.
   std::vector<std::optional<EvaluationResult>> evaluate(std::span<const ParameterSet> proposals);
+  /// How many proposals the search should make for each one that it has evaluated: more than one where a surrogate
+  /// model chooses among them.
+  std::size_t proposalsPerRun() const;
+  /// Places of the `count` most promising proposals, in ascending order.
+  std::vector<std::size_t> mostPromising(std::span<const ParameterSet> proposals, std::size_t count);
   bool isBudgetUsedUp() const { return summary_.evaluationCount >= problem_.stopping.maxEvaluations; }
 
   const SearchBounds& bounds() const { return problem_.bounds; }
@@ -61,6 +66,9 @@ class PopulationSearch : public SearchAlgorithm {
   bool isWithinBounds(const ParameterSet& set) const;
   /// Puts a point that rounding may have carried past a bound back on it.
   ParameterSet clampedToBounds(ParameterSet set) const;
+  /// Reflects coordinates outside the bounds at them; what then lies beyond the opposite bound is put on the bound that
+  /// was violated first.
+  ParameterSet reflectedAtBounds(ParameterSet set) const;
   /// A uniformly random point of a box.
   ParameterSet drawFrom(const Box& box);
   /// Places of `count` distinct members out of `size` that are sorted best first, drawn one after the other with the
@@ -72,6 +80,7 @@ class PopulationSearch : public SearchAlgorithm {
  private:
   bool isProblemValid() const;
   std::vector<EvaluationResult> run(std::span<const ParameterSet> sets, DispatchMode mode);
+  bool isSelecting() const;
   void noteLoop();
 
   SearchProblem problem_;

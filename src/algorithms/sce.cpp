@@ -4,7 +4,6 @@
 #include <utility>
 
 namespace mirevo {
-
 Sce::Sce(const SceSettings& settings, const SimplexSettings& simplex, SearchProblem problem)
     : PopulationSearch(std::move(problem)), settings_(settings), simplex_(simplex) {}
 
@@ -40,19 +39,36 @@ void Sce::shuffle() {
 }
 
 void Sce::makeEvolutionStep() {
-  for (Complex& complex : complexes_) drawSubcomplex(complex);
-  tryProposals(&Sce::reflection, Acceptance::whenBetter);
-  tryProposals(&Sce::contraction, Acceptance::whenBetter);
+  for (Complex& complex : complexes_) chooseSubcomplex(complex);
+  tryProposals(&Sce::firstProposal, Acceptance::whenBetter);
+  tryProposals(&Sce::secondProposal, Acceptance::whenBetter);
   tryProposals(&Sce::mutation, Acceptance::always);
   for (Complex& complex : complexes_) sortBestFirst(complex.points);
 }
 
-void Sce::drawSubcomplex(Complex& complex) {
+Sce::Subcomplex Sce::drawSubcomplex(const Complex& complex) {
   const std::vector<std::size_t> places =
       drawSimplex(static_cast<std::size_t>(simplex_.pointCount), complex.points.size());
+  return {places.back(), centroid(complex.points, std::span(places).first(places.size() - 1))};
+}
+
+/// Draws the subcomplex of a step. A surrogate model chooses the most promising of the reflections and contractions of
+/// several subcomplexes; it comes first, and its counterpart second.
+void Sce::chooseSubcomplex(Complex& complex) {
+  const std::size_t count = proposalsPerRun();
+  std::vector<Subcomplex> drawn;
+  std::vector<ParameterSet> proposals;
+  while (proposals.size() < count) {
+    complex.current = drawSubcomplex(complex);
+    drawn.push_back(complex.current);
+    proposals.push_back(reflection(complex));
+    if (proposals.size() < count) proposals.push_back(contraction(complex));
+  }
+  const std::size_t chosen = mostPromising(proposals, 1).front();
   complex.isMoved = false;
-  complex.worst = places.back();
-  complex.centroid = centroid(complex.points, std::span(places).first(places.size() - 1));
+  complex.current = std::move(drawn[chosen / 2]);
+  complex.first = std::move(proposals[chosen]);
+  complex.second = chosen % 2 == 0 ? contraction(complex) : std::move(proposals[chosen - 1]);
 }
 
 /// Evaluates one proposal of every complex that has not moved yet, in one batch.
@@ -66,25 +82,33 @@ void Sce::tryProposals(Proposal propose, Acceptance acceptance) {
   }
   std::vector<std::optional<EvaluationResult>> results = evaluate(proposals);
   for (std::size_t i = 0; i < proposers.size(); ++i) {
-    Individual& worst = proposers[i]->points[proposers[i]->worst];
+    Individual& worst = proposers[i]->points[proposers[i]->current.worst];
     if (!results[i]) continue;
-    if (acceptance == Acceptance::whenBetter && !isBetter(results[i]->aggregate, worst.value())) continue;
+    const bool isTakenAnyway = acceptance == Acceptance::always && isUsable(*results[i]);
+    if (!isTakenAnyway && !isBetter(results[i]->aggregate, worst.value())) continue;
     worst = {std::move(proposals[i]), std::move(*results[i])};
     proposers[i]->isMoved = true;
   }
 }
 
 ParameterSet Sce::reflection(const Complex& complex) {
-  ParameterSet point = pointOnRay(complex.centroid, complex.points[complex.worst].set, -1.0);
-  return isWithinBounds(point) ? point : mutation(complex);
+  const Subcomplex& current = complex.current;
+  ParameterSet point =
+      pointOnRay(current.centroid, complex.points[current.worst].set, -reflectionFactor(bounds().size()));
+  return isWithinBounds(point) ? point : drawFrom(boundingBox(complex.points));
 }
 
 ParameterSet Sce::contraction(const Complex& complex) {
-  return clampedToBounds(pointOnRay(complex.centroid, complex.points[complex.worst].set, 0.5));
+  const Subcomplex& current = complex.current;
+  return clampedToBounds(
+      pointOnRay(current.centroid, complex.points[current.worst].set, contractionFactor(bounds().size())));
 }
 
 ParameterSet Sce::mutation(const Complex& complex) {
-  return drawFrom(boundingBox(complex.points));
+  const Box box = boundingBox(complex.points);
+  std::vector<ParameterSet> drawn;
+  for (std::size_t i = 0; i < proposalsPerRun(); ++i) drawn.push_back(drawFrom(box));
+  return drawn[mostPromising(drawn, 1).front()];
 }
 
 }  // namespace mirevo

@@ -32,8 +32,8 @@ struct SceSettings {
 
 struct PseSettings {
   std::int32_t populationSize = 50;
-  double reflectionProbability = 0.6;
-  double contractionProbability = 0.3;
+  double reflectionProbability = 0.5;
+  double contractionProbability = 0.2;  ///< what is left to 1 is the probability of a mutation
 };
 
 struct DdsSettings {
@@ -41,7 +41,7 @@ struct DdsSettings {
 };
 
 struct SurrogateSettings {
-  std::int32_t samplingRate = 50;       ///< per cent of the proposals that the model evaluates
+  std::int32_t samplingRate = 50;  ///< per cent of the proposals that the model evaluates
   std::int32_t neighbourhoodSize = 100;
   std::int32_t modelType = 0;           ///< 0 quadratic polynomial, 1 Gaussian process
   std::int32_t initialGenerations = 5;  ///< loops evaluated by the model alone

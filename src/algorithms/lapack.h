@@ -1,0 +1,28 @@
+#pragma once
+
+/// The LAPACK routines in use, as Fortran declares them: arguments by reference, matrices column by column.
+extern "C" {
+/// Cholesky factor of the symmetric positive definite `a` (n by n); info > 0 when it is not positive definite.
+void dpotrf_(const char* uplo, const int* n, double* a, const int* lda, int* info);
+/// Solves a·x = b for `rightSides` columns of b, from the factor of dpotrf.
+void dpotrs_(const char* uplo, const int* n, const int* rightSides, const double* a, const int* lda, double* b,
+             const int* ldb, int* info);
+}
+
+namespace mirevo {
+
+/// Replaces the symmetric matrix (n·n entries) by its lower Cholesky factor; false when it is not positive definite.
+inline bool choleskyFactor(double* matrix, int n) {
+  int info = 0;
+  dpotrf_("L", &n, matrix, &n, &info);
+  return info == 0;
+}
+
+/// Solves for one right side, in place, from the factor of choleskyFactor().
+inline void choleskySolve(const double* factor, int n, double* rightSide) {
+  const int one = 1;
+  int info = 0;
+  dpotrs_("L", &n, &one, factor, &n, rightSide, &n, &info);
+}
+
+}  // namespace mirevo

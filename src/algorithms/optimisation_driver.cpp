@@ -1,0 +1,67 @@
+#include "algorithms/optimisation_driver.h"
+
+#include <memory>
+#include <new>
+#include <optional>
+#include <stdexcept>
+#include <utility>
+
+#include <fmt/format.h>
+
+#include "algorithms/proposal_selector.h"
+#include "algorithms/pse.h"
+#include "algorithms/sce.h"
+#include "common/fatal_error.h"
+#include "common/text.h"
+
+namespace mirevo {
+namespace {
+
+constexpr int kLoopsBetweenReports = 10;
+
+void checkStatus(SearchStatus status, std::string_view algorithm) {
+  if (status == kSearchOk) return;
+  fatalError(fmt::format("Error: Invalid operation in {} algorithm", algorithm), fmt::format("status {}", status));
+}
+
+std::string progressLine(const SearchSummary& summary) {
+  return fmt::format("Loop {}: {} model evaluations, best objective value {}, population spread {}", summary.loopCount,
+                     summary.evaluationCount, formatReal(summary.bestResult.aggregate),
+                     formatReal(summary.populationSpread));
+}
+
+[[noreturn]] void failForMemory() {
+  fatalError("Error: Unable to allocate memory");
+}
+
+}  // namespace
+
+SearchSummary runSearch(SearchAlgorithm& search, std::string_view algorithm, const PeriodicStep& periodicStep) {
+  try {
+    checkStatus(search.initialise(), algorithm);
+    while (!search.isTerminated()) {
+      checkStatus(search.advance(), algorithm);
+      const bool isTimeForReport = search.isTerminated() || search.summary().loopCount % kLoopsBetweenReports == 0;
+      if (isTimeForReport && periodicStep) periodicStep(progressLine(search.summary()));
+    }
+    return search.summary();
+  } catch (const std::bad_alloc&) {
+    failForMemory();
+  } catch (const std::length_error&) {  // a container asked for more than there can be
+    failForMemory();
+  }
+}
+
+SearchSummary runPopulationSearch(const PopulationSearchSettings& settings, SearchProblem problem,
+                                  const PeriodicStep& periodicStep) {
+  std::optional<ProposalSelector> selector;
+  problem.selector = settings.usesSurrogate ? &selector.emplace(settings.surrogate, problem.bounds) : nullptr;
+  if (settings.algorithm == PopulationAlgorithm::sce) {
+    Sce search(settings.sce, settings.simplex, std::move(problem));
+    return runSearch(search, "SCE", periodicStep);
+  }
+  Pse search(settings.pse, settings.simplex, std::move(problem));
+  return runSearch(search, "PSE", periodicStep);
+}
+
+}  // namespace mirevo

@@ -1,0 +1,104 @@
+#include "algorithms/proposal_selector.h"
+
+#include <algorithm>
+#include <numeric>
+#include <utility>
+
+#include "algorithms/gaussian_process.h"
+#include "algorithms/quadratic_surrogate.h"
+
+namespace mirevo {
+namespace {
+
+std::unique_ptr<SurrogateModel> makeModel(int type) {
+  if (type == 1) return std::make_unique<GaussianProcess>();
+  return std::make_unique<QuadraticSurrogate>();
+}
+
+}  // namespace
+
+ProposalSelector::ProposalSelector(const SurrogateSettings& settings, SearchBounds bounds)
+    : settings_(settings), bounds_(std::move(bounds)), model_(makeModel(settings.modelType)) {}
+
+std::vector<double> ProposalSelector::scaled(const ParameterSet& set) const {
+  std::vector<double> point(set.size());
+  for (std::size_t j = 0; j < set.size(); ++j) {
+    const double width = bounds_.upper[j] - bounds_.lower[j];
+    point[j] = width > 0.0 ? (set[j] - bounds_.lower[j]) / width : 0.0;
+  }
+  return point;
+}
+
+void ProposalSelector::note(const ParameterSet& set, const EvaluationResult& result) {
+  if (!isUsable(result)) return;
+  points_.push_back(scaled(set));
+  values_.push_back(result.aggregate);
+}
+
+bool ProposalSelector::isActive(int loop) const {
+  // Fewer points than a plane needs say nothing about the shape of the objective.
+  return loop >= settings_.initialGenerations && points_.size() >= bounds_.size() + 2;
+}
+
+std::size_t ProposalSelector::proposalsPerRun() const {
+  const int rate = std::clamp(settings_.samplingRate, 1, 100);
+  return static_cast<std::size_t>((100 + rate - 1) / rate);
+}
+
+std::vector<std::size_t> ProposalSelector::nearest(const std::vector<double>& point) const {
+  std::vector<std::size_t> places(points_.size());
+  std::iota(places.begin(), places.end(), std::size_t{0});
+  const auto wanted = static_cast<std::size_t>(std::max(settings_.neighbourhoodSize, 2));
+  if (places.size() <= wanted) return places;
+  std::vector<double> distances(points_.size());
+  for (std::size_t i = 0; i < points_.size(); ++i) {
+    for (std::size_t j = 0; j < point.size(); ++j) {
+      const double difference = points_[i][j] - point[j];
+      distances[i] += difference * difference;
+    }
+  }
+  const auto byDistance = [&](std::size_t a, std::size_t b) {
+    return distances[a] != distances[b] ? distances[a] < distances[b] : a < b;
+  };
+  std::nth_element(places.begin(), places.begin() + static_cast<std::ptrdiff_t>(wanted), places.end(), byDistance);
+  places.resize(wanted);
+  std::sort(places.begin(), places.end());
+  return places;
+}
+
+std::vector<double> ProposalSelector::predict(std::span<const ParameterSet> proposals) {
+  std::vector<double> predictions;
+  std::vector<std::size_t> fitted;  // the points that the model is fitted to
+  for (const ParameterSet& proposal : proposals) {
+    const std::vector<double> point = scaled(proposal);
+    std::vector<std::size_t> neighbours = nearest(point);
+    if (neighbours != fitted) {
+      std::vector<std::vector<double>> points;
+      std::vector<double> values;
+      for (const std::size_t place : neighbours) {
+        points.push_back(points_[place]);
+        values.push_back(values_[place]);
+      }
+      if (!model_->fit(points, values)) return {};
+      fitted = std::move(neighbours);
+    }
+    predictions.push_back(model_->predict(point));
+  }
+  return predictions;
+}
+
+std::vector<std::size_t> ProposalSelector::select(std::span<const ParameterSet> proposals, std::size_t count) {
+  std::vector<std::size_t> places(proposals.size());
+  std::iota(places.begin(), places.end(), std::size_t{0});
+  if (count >= places.size()) return places;
+  const std::vector<double> predictions = predict(proposals);
+  if (!predictions.empty()) {
+    std::stable_sort(places.begin(), places.end(),
+                     [&](std::size_t a, std::size_t b) { return isBetter(predictions[a], predictions[b]); });
+  }
+  places.resize(count);
+  std::sort(places.begin(), places.end());
+  return places;
+}
+
+}  // namespace mirevo

@@ -1,0 +1,48 @@
+#pragma once
+
+#include <cstddef>
+#include <memory>
+#include <span>
+#include <vector>
+
+#include "algorithms/population.h"
+#include "algorithms/search_algorithm.h"
+#include "algorithms/search_settings.h"
+#include "algorithms/surrogate_model.h"
+
+namespace mirevo {
+
+/// Chooses with a surrogate model which proposals of a search are worth a model run. It keeps every evaluated point; a
+/// proposal is predicted by a model fitted to the `neighbourhoodSize` evaluated points nearest to it, distances taken
+/// relative to the bounds. Predictions rank proposals and do nothing else.
+class ProposalSelector final {
+ public:
+  ProposalSelector(const SurrogateSettings& settings, SearchBounds bounds);
+
+  /// Remembers an evaluated point. A failed one is left out: its stand-in value would distort every fit around it.
+  void note(const ParameterSet& set, const EvaluationResult& result);
+
+  /// Whether proposals are ranked in this loop (counted from 0), rather than all run.
+  bool isActive(int loop) const;
+  /// How many proposals to make for each one to be run: 100 / samplingRate, rounded up.
+  std::size_t proposalsPerRun() const;
+
+  /// The `count` proposals with the best predictions, in ascending order of their places; where no model can be fitted,
+  /// the first `count`.
+  std::vector<std::size_t> select(std::span<const ParameterSet> proposals, std::size_t count);
+
+ private:
+  std::vector<double> scaled(const ParameterSet& set) const;
+  /// Predictions, one a proposal; empty when no model can be fitted.
+  std::vector<double> predict(std::span<const ParameterSet> proposals);
+  /// Places in the archive of the points nearest to `point`, in ascending order.
+  std::vector<std::size_t> nearest(const std::vector<double>& point) const;
+
+  SurrogateSettings settings_;
+  SearchBounds bounds_;
+  std::unique_ptr<SurrogateModel> model_;
+  std::vector<std::vector<double>> points_;  ///< evaluated points relative to the bounds, in order of evaluation
+  std::vector<double> values_;               ///< their objective values
+};
+
+}  // namespace mirevo
