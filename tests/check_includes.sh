@@ -11,7 +11,8 @@ declare -A allowed=(
   [evaluation]="evaluation common platform parameters measures"
   [algorithms]="algorithms common parameters measures evaluation"
   [report]="report common platform parameters measures"
-  [run]="run common platform parameters measures evaluation algorithms report"
+  [viewer]="viewer common platform"
+  [run]="run common platform parameters measures evaluation algorithms report viewer"
 )
 bad=0
 checked=0

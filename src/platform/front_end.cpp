@@ -5,7 +5,21 @@
 #include <cstdio>
 #include <cstdlib>
 #include <ctime>
+#include <unistd.h>
+
 namespace mirevo {
+namespace {
+
+std::string localTime(const char* format) {
+  const std::time_t now = std::time(nullptr);
+  std::tm local{};
+  ::localtime_r(&now, &local);
+  std::array<char, 40> text{};
+  const std::size_t length = std::strftime(text.data(), text.size(), format, &local);
+  return {text.data(), length};
+}
+
+}  // namespace
 
 void showMessage(std::string_view text, std::string_view title) {
   std::string shown;
@@ -23,12 +37,16 @@ double runTimeClock() {
 }
 
 std::string dateAndTimeNow() {
-  const std::time_t now = std::time(nullptr);
-  std::tm local{};
-  ::localtime_r(&now, &local);
-  std::array<char, 32> text{};
-  const std::size_t length = std::strftime(text.data(), text.size(), "%Y-%m-%d %H:%M:%S", &local);
-  return {text.data(), length};
+  return localTime("%Y-%m-%d %H:%M:%S");
+}
+
+std::string dateAndTimeWithZone() {
+  return localTime("%Y-%m-%d %H:%M:%S %z");
+}
+
+std::string hostName() {
+  std::array<char, 256> name{};
+  return ::gethostname(name.data(), name.size() - 1) == 0 ? std::string(name.data()) : std::string{};
 }
 
 }  // namespace mirevo

@@ -13,6 +13,7 @@
 #include "run/run_driver.h"
 #include "run/stop_run.h"
 #include "run/version.h"
+#include "viewer/qmon_start.h"
 
 namespace mirevo {
 namespace {
@@ -22,7 +23,7 @@ constexpr std::string_view kUsage = "Usage: Mirevo kdx-file";
 constexpr std::string_view kHelp = R"(
 Calibrates and analyses a simulation model as the setup file (KDX format) says.
 
-  //qmon      messages for the progress viewer
+  //qmon      shows the run's progress on this terminal
   --version   prints the version
   --help      prints this text
 
@@ -30,18 +31,23 @@ Written beside the setup file: <setup>.log and the results of every evaluation. 
 messages here; creating the file <setup>._kill_ cancels the run.
 )";
 
-/// Answers a question about the program itself; false when the argument is none, or names a file.
-bool answerQuestion(const std::string& argument) {
+/// Whether the argument is a question about the program itself, and names no file.
+bool isQuestion(const std::string& argument) {
   std::error_code ignored;
-  if (std::filesystem::exists(argument, ignored)) return false;
+  return (argument == "--version" || argument == "--help") && !std::filesystem::exists(argument, ignored);
+}
+
+void answerQuestion(const std::string& argument) {
   if (argument == "--version") {
     fmt::print("Mirevo {}\n", programVersion());
-  } else if (argument == "--help") {
-    fmt::print("{}\n{}", kUsage, kHelp);
   } else {
-    return false;
+    fmt::print("{}\n{}", kUsage, kHelp);
   }
-  return true;
+}
+
+/// Whether a job launcher started the program: it watches over its processes, which must stay those that it started.
+bool isPartOfJob() {
+  return std::getenv("OMPI_COMM_WORLD_SIZE") != nullptr || std::getenv("PMI_SIZE") != nullptr;
 }
 
 /// A run whose caller has closed standard input, output or error would open its files in their place, and messages
@@ -59,7 +65,11 @@ void occupyStandardDescriptors() {
 void processStart(int argc, char** argv) {
   occupyStandardDescriptors();
   const CommandLine commandLine(argc, argv);
-  runWithFrontEnd(commandLine.wantsProgressViewer() ? "G48=QMON" : "G48=WIN", commandLine);
+  if (!commandLine.wantsProgressViewer()) runWithFrontEnd("G48=WIN", commandLine);
+  const auto run = [&commandLine] { runWithFrontEnd("G48=QMON", commandLine); };
+  const std::string setupFileName(commandLine.setupFileName());
+  if (setupFileName.empty() || isQuestion(setupFileName) || isPartOfJob()) run();
+  qmonExit(qmonStart(setupFileName, run));
 }
 
 void runWithFrontEnd(std::string_view environmentSetting, const CommandLine& commandLine) {
@@ -76,7 +86,10 @@ void mirevoMain(const CommandLine& commandLine) {
     showMessage(kUsage);
     stopRun(1);
   }
-  if (answerQuestion(setupFileName)) stopRun(0);
+  if (isQuestion(setupFileName)) {
+    answerQuestion(setupFileName);
+    stopRun(0);
+  }
   int exitCode = 1;
   {
     RunDriver driver;

@@ -110,8 +110,9 @@ void ProgressReporter::writeProgress(std::string_view text) {
   writeRecord("PROGRE", text);
 }
 
-void ProgressReporter::progressStart() {
+void ProgressReporter::progressStart(std::string_view origin) {
   writeStatus("Initialisation");
+  writeMessage(fmt::format("Run started {}", origin));
   writeProgress("0.0");
 }
 
@@ -141,7 +142,12 @@ void ProgressReporter::progressStep() {
   isCancelled();
 }
 
-void ProgressReporter::progressEnd() {
+void ProgressReporter::progressBest(int number, double aggregate, std::string_view foundAt) {
+  writeMessage(fmt::format("Best so far: {} (evaluation {}, {})", formatReal(aggregate), number, foundAt));
+}
+
+void ProgressReporter::progressEnd(std::string_view ending) {
+  writeStatus(fmt::format("Ended: {}", ending));
   writeProgress("100.0");
   if (messageUnit_ > kStandardOutput) ::close(messageUnit_);
   messageUnit_ = kNowhere;

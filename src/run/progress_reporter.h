@@ -32,12 +32,16 @@ class ProgressReporter final {
   void writeTimeLeft(std::string_view text);
   void writeProgress(std::string_view text);
 
-  void progressStart();
+  /// The first records; `origin` says when, where and as what the run was started.
+  void progressStart(std::string_view origin);
   /// Before the first evaluation: `plannedEvaluations` is what progressStep() counts towards.
   void progressEvaluationLabel(int plannedEvaluations);
   /// After each completed evaluation: speed, time left and percentage; then looks for the kill file.
   void progressStep();
-  void progressEnd();
+  /// A new best evaluation: its number, aggregate, and when it was found, as dateAndTimeWithZone() says it.
+  void progressBest(int number, double aggregate, std::string_view foundAt);
+  /// The last records; `ending` says how the run ended ("Normal termination").
+  void progressEnd(std::string_view ending);
 
   /// Whether the run was told to stop. Once it has been, it stays so and the disk is not asked again.
   bool isCancelled();

@@ -2,6 +2,7 @@
 
 #include <filesystem>
 #include <new>
+#include <unistd.h>
 
 #include <fmt/format.h>
 
@@ -66,6 +67,7 @@ int RunDriver::run(const std::string& setupFileName) {
     buildModel();
     logSetup();
     openResults();
+    state_.progress.writeMessage("Title: " + config_.title);
     state_.progress.writeStatus(taskName(config_));
     state_.progress.progressEvaluationLabel(config_.plannedEvaluations());
     finish(runTask({config_, parameters_->searchSpace(), *evaluator_, state_.log}));
@@ -104,7 +106,7 @@ void RunDriver::openRun(const std::string& setupFileName) {
     state_.log.warning(problem);
     showMessage(problem);
   }
-  state_.progress.progressStart();
+  state_.progress.progressStart(fmt::format("{} on {}, process {}", dateAndTimeWithZone(), hostName(), ::getpid()));
 }
 
 void RunDriver::buildModel() {
@@ -197,7 +199,7 @@ void RunDriver::finish(std::string_view terminationMessage) {
   }
   signalState.runLogDescriptor = -1;
   state_.log.close();
-  state_.progress.progressEnd();
+  state_.progress.progressEnd(kNormalTermination);
 }
 
 int RunDriver::endInError(std::string_view message, std::string_view detail) {
@@ -211,7 +213,7 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
   }
   std::string reason;
   closeResults(message, reason);  // the run has failed already, with the first reason
-  return endEarly();
+  return endEarly(message);
 }
 
 int RunDriver::endCancelled() {
@@ -220,14 +222,14 @@ int RunDriver::endCancelled() {
   if (!closeResults("Simulation cancelled", reason)) {
     state_.log.line(fmt::format("Error: Unable to write to {}\n{}", results_.path(), reason));
   }
-  return endEarly();
+  return endEarly("Simulation cancelled");
 }
 
-int RunDriver::endEarly() {
+int RunDriver::endEarly(std::string_view ending) {
   signalState.runLogDescriptor = -1;
   state_.log.close();
   if (launcher_) launcher_->haltProcesses();
-  state_.progress.progressEnd();
+  state_.progress.progressEnd(ending);
   return 1;
 }
 

@@ -44,7 +44,7 @@ class RunDriver final {
   int endInError(std::string_view message, std::string_view detail);
   int endCancelled();
   /// Log closed, model processes halted, progress ended.
-  int endEarly();
+  int endEarly(std::string_view ending);
   std::vector<std::string> closingLines(std::string_view terminationMessage) const;
 
   RunState state_;

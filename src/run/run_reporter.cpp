@@ -41,7 +41,9 @@ void RunReporter::evaluationFinished(std::span<const double> set, const Evaluati
 void RunReporter::considerAsBest(int number, double aggregate, const std::vector<double>& parameterValues) {
   const bool isBetter =
       !best_ || aggregate < best_->aggregate || (aggregate == best_->aggregate && number < best_->number);
-  if (isBetter) best_ = Best{number, aggregate, parameterValues};
+  if (!isBetter) return;
+  best_ = Best{number, aggregate, parameterValues};
+  state_.progress.progressBest(number, aggregate, dateAndTimeWithZone());
 }
 
 void RunReporter::settle(const ObjectiveAggregator& aggregator) {

@@ -21,18 +21,22 @@ class ProgressReporterTest : public ::testing::Test {
 TEST_F(ProgressReporterTest, AMessageFileHoldsOneRecordALineKindFirst) {
   folder_.write("basin._spi_", "left from an earlier and longer run, which must not show through\n");
   EXPECT_EQ(init(reporter_), "");
-  reporter_.progressStart();
+  reporter_.progressStart("2026-11-21 04:10:09 +0100 on host, process 7");
   reporter_.progressEvaluationLabel(4);
   reporter_.writeMessage("two\nlines");
   now_ += 2.0;
   reporter_.progressStep();
   now_ += 2.0;
   reporter_.progressStep();
-  reporter_.progressEnd();
+  reporter_.progressBest(2, 0.1, "2026-11-21 04:12:09 +0100");
+  reporter_.progressEnd("Normal termination");
   reporter_.writeMessage("after the end");
   EXPECT_EQ(folder_.read("basin._spi_"),
-            "STATUSInitialisation\nPROGRE0.0\nSTALBLModel evaluation\nMESLBL of 4\nMESSAGtwo lines\n"
-            "COMSPD0.5\nTIMLFT6\nPROGRE25.0\nCOMSPD0.5\nTIMLFT4\nPROGRE50.0\nPROGRE100.0\n");
+            "STATUSInitialisation\nMESSAGRun started 2026-11-21 04:10:09 +0100 on host, process "
+            "7\nPROGRE0.0\nSTALBLModel evaluation\nMESLBL of 4\nMESSAGtwo lines\n"
+            "COMSPD0.5\nTIMLFT6\nPROGRE25.0\nCOMSPD0.5\nTIMLFT4\nPROGRE50.0\n"
+            "MESSAGBest so far: 0.1 (evaluation 2, 2026-11-21 04:12:09 +0100)\n"
+            "STATUSEnded: Normal termination\nPROGRE100.0\n");
 }
 
 TEST_F(ProgressReporterTest, StandardOutputTakesMessagesAloneAndNoneTakesNothing) {
@@ -40,13 +44,15 @@ TEST_F(ProgressReporterTest, StandardOutputTakesMessagesAloneAndNoneTakesNothing
     ProgressReporter reporter([this] { return now_; });
     EXPECT_EQ(init(reporter, destination), "");
     ::testing::internal::CaptureStdout();
-    reporter.progressStart();
+    reporter.progressStart("2026-11-21 04:10:09 +0100 on host, process 7");
     reporter.progressEvaluationLabel(2);
     reporter.writeMessage("Evaluation of parameter set No. 1 initiated");
     reporter.progressStep();
-    reporter.progressEnd();
-    EXPECT_EQ(::testing::internal::GetCapturedStdout(),
-              destination == "STDOUT" ? " Evaluation of parameter set No. 1 initiated\n" : "");
+    reporter.progressEnd("Normal termination");
+    EXPECT_EQ(::testing::internal::GetCapturedStdout(), destination == "STDOUT"
+                                                            ? " Run started 2026-11-21 04:10:09 +0100 on host, process "
+                                                              "7\n Evaluation of parameter set No. 1 initiated\n"
+                                                            : "");
     EXPECT_FALSE(folder_.has("basin._spi_"));
   }
 }
@@ -79,7 +85,7 @@ TEST_F(ProgressReporterTest, OnlyAKillFileOfThisRunCancelsItAndForGood) {
 TEST_F(ProgressReporterTest, AMessageFileThatCannotBeOpenedIsReportedAndTheRunGoesOn) {
   std::filesystem::create_directories(folder_.file("basin._spi_"));
   EXPECT_TRUE(init(reporter_).starts_with("Unable to open TqQmon2 message file: " + folder_.file("basin._spi_")));
-  reporter_.progressStart();
+  reporter_.progressStart("2026-11-21 04:10:09 +0100 on host, process 7");
   reporter_.progressStep();
   EXPECT_FALSE(reporter_.isCancelled());
 }

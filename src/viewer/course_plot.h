@@ -1,0 +1,19 @@
+#pragma once
+
+#include <cstdint>
+#include <span>
+#include <string>
+#include <vector>
+
+#include "viewer/display_text.h"
+#include "viewer/progress_state.h"
+
+namespace mirevo {
+
+/// The course of the best aggregate against evaluations (0 to `evaluations`) as `height` lines of at most `width`
+/// columns: a descending staircase, its largest and smallest value at the left, the evaluations below. The scale is
+/// logarithmic where the values span two decades or more. Nothing when there is no course or no room for one.
+std::vector<std::string> plotCourse(std::span<const ProgressState::CoursePoint> course, std::int64_t evaluations,
+                                    int width, int height, CharacterSet characters);
+
+}  // namespace mirevo

@@ -1,0 +1,50 @@
+#pragma once
+
+#include <cstdint>
+#include <deque>
+#include <optional>
+#include <string>
+#include <vector>
+
+namespace mirevo {
+
+/// What a run has told about itself so far, as its message file holds it. Times are seconds since 1970-01-01 UTC.
+struct ProgressState {
+  bool hasRecords = false;
+  std::string title;
+  std::string task;    ///< what it is doing
+  std::string ending;  ///< how it ended; empty until the run itself has said so
+  std::string host;
+  std::int64_t process = 0;         ///< 0 while unknown
+  std::optional<double> startedAt;  ///< by the clock of the run's machine
+
+  std::string countLabel;               ///< "Model evaluation"; empty before the task has begun
+  std::optional<std::int64_t> planned;  ///< evaluations
+  std::int64_t done = 0;                ///< evaluations, failed ones included
+  std::int64_t failed = 0;
+
+  std::optional<double> percent;
+  std::optional<double> perSecond;
+  std::optional<double> secondsLeft;  ///< as told at `lastNewsAt`
+  double lastNewsAt = 0.0;            ///< when the latest records were written
+
+  struct Best {
+    double aggregate = 0.0;
+    std::int64_t evaluation = 0;
+    std::optional<double> foundAt;
+  };
+  std::optional<Best> best;
+
+  /// The best aggregate after `evaluations` of them, from there to the next point.
+  struct CoursePoint {
+    std::int64_t evaluations = 0;
+    double aggregate = 0.0;
+  };
+  std::vector<CoursePoint> course;  ///< thinned when it becomes long
+
+  std::deque<std::string> notices;    ///< the latest messages that are no routine, oldest first
+  std::string latestMessage;          ///< of any kind
+  bool isLatestMessageNotice = true;  ///< then it is the last of `notices`
+};
+
+}  // namespace mirevo

@@ -1,0 +1,52 @@
+#include "viewer/qmon_start.h"
+
+#include <array>
+#include <cerrno>
+#include <cstdlib>
+#include <cstring>
+#include <fcntl.h>
+#include <memory>
+#include <signal.h>
+#include <unistd.h>
+
+#include <fmt/format.h>
+
+#include "platform/front_end.h"
+#include "viewer/run_process.h"
+#include "viewer/viewer.h"
+
+namespace mirevo {
+namespace {
+
+/// The run's side: away from the terminal, what it prints into the pipe, its records into the message file.
+void becomeRun(int output) {
+  ::setsid();
+  ::signal(SIGPIPE, SIG_IGN);
+  if (const int nothing = ::open("/dev/null", O_RDONLY | O_CLOEXEC); nothing >= 0) {
+    ::dup2(nothing, STDIN_FILENO);
+    ::close(nothing);
+  }
+  ::dup2(output, STDOUT_FILENO);
+  ::dup2(output, STDERR_FILENO);
+  ::unsetenv("VOLK_PROGRESS");
+}
+
+}  // namespace
+
+int qmonStart(const std::string& setupFile, const std::function<void()>& run) {
+  std::array<int, 2> pipe{-1, -1};
+  const pid_t process = ::pipe2(pipe.data(), O_CLOEXEC | O_NONBLOCK) == 0 ? ::fork() : -1;
+  if (process > 0) {
+    ::close(pipe[1]);
+    return Viewer(setupFile, std::make_unique<RunProcess>(process, pipe[0])).watch();
+  }
+  if (process < 0) showMessage(fmt::format("Unable to start the progress viewer: {}", std::strerror(errno)));
+  if (process == 0) becomeRun(pipe[1]);
+  for (const int end : pipe) {
+    if (end >= 0) ::close(end);
+  }
+  run();
+  return 1;
+}
+
+}  // namespace mirevo

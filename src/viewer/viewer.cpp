@@ -1,0 +1,219 @@
+#include "viewer/viewer.h"
+
+#include <algorithm>
+#include <array>
+#include <cerrno>
+#include <chrono>
+#include <cstring>
+#include <fcntl.h>
+#include <poll.h>
+#include <signal.h>
+#include <unistd.h>
+
+#include <fmt/format.h>
+
+#include "common/text.h"
+#include "platform/front_end.h"
+
+namespace mirevo {
+namespace {
+
+constexpr int kLookMilliseconds = 500;
+constexpr int kPiecesAtATime = 64;
+constexpr std::size_t kEarlierMessages = 20;  ///< shown as lines of a run that has been going before
+constexpr std::size_t kKeptOutput = 64 * 1024;
+constexpr char kControlC = 3;
+constexpr char kControlL = 12;
+constexpr char kControlZ = 26;
+
+double secondsSince1970() {
+  return std::chrono::duration<double>(std::chrono::system_clock::now().time_since_epoch()).count();
+}
+
+}  // namespace
+
+std::string baseNameOfSetup(std::string_view setupFile) {
+  for (const std::string_view ending : {".kdx", ".log", "._spi_"}) {
+    const std::size_t length = setupFile.size() - std::min(setupFile.size(), ending.size());
+    if (length > 0 && equalIgnoringCase(setupFile.substr(length), ending))
+      return std::string(setupFile.substr(0, length));
+  }
+  return std::string(setupFile);
+}
+
+Viewer::Viewer(std::string setupFile, std::unique_ptr<RunProcess> started)
+    : setupFile_(std::move(setupFile)),
+      baseName_(baseNameOfSetup(setupFile_)),
+      host_(hostName()),
+      started_(std::move(started)),
+      file_(baseName_ + "._spi_"),
+      display_(openDisplay()) {
+  situation_.setupName = baseName_.substr(baseName_.rfind('/') + 1);
+  situation_.wasStarted = started_ != nullptr;
+}
+
+const ProgressState& Viewer::state() const {
+  // Until the started run has begun its message file, what stands there is of an earlier run.
+  static const ProgressState kNothingYet;
+  if (started_ && records_.state().process != started_->process()) return kNothingYet;
+  return records_.state();
+}
+
+int Viewer::watch() {
+  while (!leaves_) {
+    readNews();
+    if (!display_->show(state(), situation_, newMessages_)) break;
+    newMessages_.clear();
+    if (isOver()) break;
+    waitForNews(hasMore_);
+    takeSignals();
+    takeKeys();
+  }
+  display_->close(state(), situation_);
+  sayGoodbye();
+  return started_ ? started_->exitCode().value_or(0) : 0;
+}
+
+/// A run that came with its viewer is over with its process; of another one's end a screen stays until its user leaves.
+bool Viewer::isOver() const {
+  if (hasMore_) return false;
+  const bool hasEnded = situation_.presence == RunPresence::ended || situation_.presence == RunPresence::vanished;
+  return hasEnded && (started_ || !display_->isScreen());
+}
+
+void Viewer::readNews() {
+  // Asked before the records are read: a run that has just ended has written its last ones.
+  const ProgressState& before = records_.state();
+  const bool isGone = started_ ? started_->exitCode().has_value()
+                               : before.process > 0 && before.host == host_ &&
+                                     ::kill(static_cast<pid_t>(before.process), 0) != 0 && errno == ESRCH;
+  const bool takesMessages = !display_->isScreen();
+  hasMore_ = true;
+  for (int piece = 0; hasMore_ && piece < kPiecesAtATime; ++piece) {
+    hasMore_ = file_.readPiece(records_, takesMessages ? &newMessages_ : nullptr);
+    if (!hasCaughtUp_ && newMessages_.size() > kEarlierMessages) {
+      newMessages_.erase(newMessages_.begin(), newMessages_.end() - kEarlierMessages);
+    }
+  }
+  if (!hasMore_) hasCaughtUp_ = true;
+  if (started_ && records_.state().process != started_->process()) newMessages_.clear();
+  readRunOutput();
+  situation_.now = secondsSince1970();
+  judgePresence(isGone && !hasMore_);
+}
+
+void Viewer::readRunOutput() {
+  if (!started_) return;
+  runOutput_ += started_->takeOutput();
+  if (runOutput_.size() > kKeptOutput) runOutput_.erase(0, runOutput_.size() - kKeptOutput);
+}
+
+void Viewer::judgePresence(bool processIsGone) {
+  const ProgressState& known = state();
+  RunPresence& presence = situation_.presence;
+  if (processIsGone) {
+    presence = known.ending.empty() ? RunPresence::vanished : RunPresence::ended;
+  } else if (!known.hasRecords) {
+    presence = RunPresence::awaited;
+  } else {
+    presence = known.ending.empty() || started_ ? RunPresence::running : RunPresence::ended;
+  }
+  if (presence == RunPresence::running) return;
+  situation_.asksToCancel = false;
+  situation_.cancelRequested = false;
+}
+
+void Viewer::waitForNews(bool hasMore) const {
+  const bool takesKeys = !keysEnded_ && (display_->isScreen() || hasKeyboard());
+  std::array<pollfd, 3> sources{{{takesKeys ? STDIN_FILENO : -1, POLLIN, 0},
+                                 {signals_.descriptor(), POLLIN, 0},
+                                 {started_ ? started_->output() : -1, POLLIN, 0}}};
+  ::poll(sources.data(), sources.size(), hasMore ? 0 : kLookMilliseconds);
+}
+
+void Viewer::takeSignals() {
+  while (const int signal = signals_.next()) {
+    if (signal == SIGHUP) leaves_ = true;
+    if (signal == SIGWINCH || signal == SIGCONT) display_->redraw();
+    if (signal == SIGINT && started_ && !display_->isScreen() && !hasKeyboard()) {
+      started_->send(SIGINT);  // nobody can be asked
+    } else if (signal == SIGINT) {
+      takeKey(kControlC);
+    }
+    if (signal == SIGTERM || signal == SIGQUIT) {
+      if (started_) started_->send(SIGTERM);
+      leaves_ = leaves_ || !started_;
+    }
+  }
+}
+
+void Viewer::takeKeys() {
+  if (keysEnded_ || !(display_->isScreen() || hasKeyboard())) return;
+  pollfd keyboard{STDIN_FILENO, POLLIN, 0};
+  if (::poll(&keyboard, 1, 0) <= 0) return;
+  std::array<char, 64> keys{};
+  const ssize_t count = ::read(STDIN_FILENO, keys.data(), keys.size());
+  if (count < 0 && (errno == EINTR || errno == EAGAIN)) return;
+  if (count <= 0) {
+    keysEnded_ = true;
+    leaves_ = leaves_ || display_->isScreen();  // the terminal is gone
+    return;
+  }
+  // Cursor and function keys come as an escape sequence, of which no letter must count as a key.
+  if (keys[0] == '\x1b') return situation_.asksToCancel ? takeKey(' ') : void();
+  for (ssize_t i = 0; i < count; ++i) takeKey(keys[static_cast<std::size_t>(i)]);
+}
+
+void Viewer::takeKey(char key) {
+  if (key == '\n' && !display_->isScreen()) return;
+  if (situation_.asksToCancel) {
+    situation_.asksToCancel = false;
+    if (key == 'y' || key == 'Y') cancelRun();
+    return;
+  }
+  situation_.problem.clear();
+  if (key == 'd' || key == 'D' || (key == kControlC && !started_)) {
+    leaves_ = true;
+  } else if (key == 'q' || key == 'Q' || key == kControlC) {
+    takeCancelKey();
+  } else if (key == kControlZ) {
+    display_->suspend();
+  } else if (key == kControlL) {
+    display_->redraw();
+  }
+}
+
+/// With nothing to cancel it is the key to leave.
+void Viewer::takeCancelKey() {
+  if (situation_.presence == RunPresence::running) {
+    situation_.asksToCancel = !situation_.cancelRequested;
+  } else if (situation_.presence != RunPresence::awaited || !started_) {
+    leaves_ = true;
+  }
+}
+
+void Viewer::cancelRun() {
+  if (situation_.presence != RunPresence::running) return;
+  const std::string killFile = baseName_ + "._kill_";
+  const int descriptor = ::open(killFile.c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0666);
+  if (descriptor < 0) {
+    situation_.problem = fmt::format("Unable to cancel: {}: {}", killFile, std::strerror(errno));
+    return;
+  }
+  ::close(descriptor);
+  situation_.cancelRequested = true;
+}
+
+void Viewer::sayGoodbye() const {
+  if (!started_) return;
+  if (started_->exitCode()) {
+    std::fwrite(runOutput_.data(), 1, runOutput_.size(), stderr);
+    return;
+  }
+  writeToOutput(
+      fmt::format("The run goes on as process {}.\n  mirevo-viewer '{}'\nshows it again;\n  touch '{}._kill_'\n"
+                  "cancels it.\n",
+                  started_->process(), setupFile_, baseName_));
+}
+
+}  // namespace mirevo

@@ -1,0 +1,198 @@
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "integration/model_folder.h"
+#include "integration/pseudo_terminal.h"
+
+namespace mirevo::testing {
+namespace {
+
+using ::testing::HasSubstr;
+using ::testing::Not;
+
+/// A run of this process, as its message file tells it.
+std::string runningRun() {
+  return "STATUSInitialisation\nMESSAGRun started 2026-11-21 00:00:00 +0000 on elsewhere, process 77\n"
+         "MESSAGTitle: Hand-made\nSTATUSScenario runs: Multiple runs\nSTALBLModel evaluation\nMESLBL of 8\n"
+         "MESSAGEvaluation of parameter set No. 1 completed: OK\nMESSAGBest so far: 4.5 (evaluation 1)\nPROGRE12.5\n";
+}
+
+/// A model that takes its time: 200 evaluations of a tenth of a second.
+RunSettings slowRun() {
+  RunSettings settings;
+  settings.maxEvaluations = 200;
+  settings.modelArguments = "--sleep-ms 100";
+  return settings;
+}
+
+class ViewerTest : public ::testing::Test {
+ protected:
+  std::vector<std::string> attached() const { return {MIREVO_VIEWER, folder_.file("basin.kdx")}; }
+  bool reaches(const std::string& file, const std::string& text) const {
+    return waitUntil([&] { return folder_.read(file).find(text) != std::string::npos; });
+  }
+  int runsProcess() const {
+    const std::string records = folder_.read("basin._spi_");
+    const std::size_t at = records.find(", process ");
+    return at == std::string::npos ? 0 : std::atoi(records.c_str() + at + 10);
+  }
+
+  const ModelFolder folder_;
+};
+
+TEST_F(ViewerTest, AttachedItFollowsARunAndOnlyAConfirmedKeyCancelsIt) {
+  folder_.write("basin.kdx", "");
+  TerminalProgram viewer(attached());
+  ASSERT_TRUE(viewer.shows("waiting for one"));
+  folder_.write("basin._spi_", runningRun());
+  ASSERT_TRUE(viewer.shows("Hand-made"));
+  ASSERT_TRUE(viewer.shows("1 of 8"));
+  ASSERT_TRUE(viewer.shows("4.5 (No. 1)"));
+  folder_.write("basin._spi_", runningRun() + "MESSAGEvaluation of parameter set No. 2 completed: FAILED - x\n");
+  ASSERT_TRUE(viewer.shows("2 of 8, 1 failed"));
+  viewer.resize(40, 10);
+  ASSERT_TRUE(viewer.shows("Runs      2 of 8"));
+
+  for (const std::string otherKey : {"n", "q", "\x1b[A", "\r"}) {
+    viewer.type("q");
+    ASSERT_TRUE(viewer.shows("Cancel the run?"));
+    viewer.type(otherKey);
+    ASSERT_TRUE(viewer.shows("q cancel run"));
+  }
+  EXPECT_FALSE(folder_.has("basin._kill_"));
+  viewer.type("q");
+  ASSERT_TRUE(viewer.shows("Cancel the run?"));
+  viewer.type("y");
+  ASSERT_TRUE(viewer.shows("Cancelling"));
+  EXPECT_TRUE(folder_.has("basin._kill_"));
+  folder_.write("basin._spi_", runningRun() + "STATUSEnded: Simulation cancelled\nPROGRE100.0\n");
+  ASSERT_TRUE(viewer.shows("Simulation cancelled"));
+  viewer.type("q");
+  EXPECT_EQ(viewer.wait(), 0);
+}
+
+TEST_F(ViewerTest, AttachedLeavingInAnyWayLeavesNoTrace) {
+  folder_.write("basin.kdx", "");
+  folder_.write("basin._spi_", runningRun());
+  for (const std::string key : {"d", "\x03", ""}) {
+    TerminalProgram viewer(attached());
+    ASSERT_TRUE(viewer.shows("Hand-made"));
+    if (key.empty()) viewer.hangUp();
+    if (!key.empty()) viewer.type(key);
+    EXPECT_EQ(viewer.wait(), 0);
+    EXPECT_THAT(viewer.output(), HasSubstr(key.empty() ? "\x1b[?1049h" : "\x1b[?25h\x1b[?1049l"));
+    EXPECT_FALSE(folder_.has("basin._kill_"));
+  }
+}
+
+TEST_F(ViewerTest, AKillFileThatCannotBeMadeIsSaid) {
+  folder_.write("basin.kdx", "");
+  folder_.write("basin._spi_", runningRun());
+  std::filesystem::create_symlink("no/such/folder/file", folder_.file("basin._kill_"));
+  TerminalProgram viewer(attached());
+  ASSERT_TRUE(viewer.shows("Hand-made"));
+  viewer.type("q");
+  ASSERT_TRUE(viewer.shows("Cancel the run?"));
+  viewer.type("y");
+  EXPECT_TRUE(viewer.shows("Unable to cancel"));
+}
+
+TEST_F(ViewerTest, StartedWithTheRunItEndsWithTheRunsExitCode) {
+  RunSettings settings;
+  settings.maxEvaluations = 5;
+  TerminalProgram good({MIREVO_PROGRAM, "//QMon", folder_.writeSetup(settings)}, {{"VOLK_PROGRESS", "NONE"}});
+  EXPECT_EQ(good.wait(), 0);
+  EXPECT_THAT(good.output(), HasSubstr("Normal termination"));
+  EXPECT_THAT(folder_.read("basin.log"), HasSubstr("Normal termination"));
+
+  settings.modelArguments = "--exit-code 3";
+  TerminalProgram bad({MIREVO_PROGRAM, "//qmon", folder_.writeSetup(settings)});
+  EXPECT_EQ(bad.wait(), 1);
+  EXPECT_THAT(bad.output(), HasSubstr("No of failed simulations too high"));
+  EXPECT_THAT(bad.output(), HasSubstr("exited with code 3"));  // a line that stands on standard error alone
+}
+
+TEST_F(ViewerTest, ARunOutlivesItsViewerUntouched) {
+  struct Case {
+    const char* name;
+    std::function<void(TerminalProgram&)> part;
+    bool saysHowToAttach;
+  };
+  for (const Case& example :
+       {Case{"d", [](TerminalProgram& viewer) { viewer.type("d"); }, true},
+        Case{"hang-up", [](TerminalProgram& viewer) { viewer.hangUp(); }, false},
+        Case{"crash", [](TerminalProgram& viewer) { ::kill(viewer.process(), SIGKILL); }, false}}) {
+    SCOPED_TRACE(example.name);
+    TerminalProgram viewer({MIREVO_PROGRAM, "//qmon", folder_.writeSetup(slowRun())});
+    ASSERT_TRUE(viewer.shows("of 200"));
+    const int process = runsProcess();
+    example.part(viewer);
+    EXPECT_EQ(viewer.wait(), std::string(example.name) == "crash" ? 128 + SIGKILL : 0);
+    const std::size_t size = folder_.read("basin._spi_").size();
+    EXPECT_TRUE(waitUntil([&] { return folder_.read("basin._spi_").size() > size + 1000; }));
+    EXPECT_TRUE(isRunning(process));
+    if (example.saysHowToAttach) {
+      EXPECT_THAT(viewer.output(), HasSubstr(fmt::format("The run goes on as process {}.", process)));
+    }
+
+    TerminalProgram again(attached());
+    ASSERT_TRUE(again.shows("Small test basin"));
+    again.type("qy");
+    ASSERT_TRUE(again.shows("Simulation cancelled"));
+    EXPECT_TRUE(waitUntil([&] { return !isRunning(process); }));
+  }
+}
+
+TEST_F(ViewerTest, ControlCAsksUnderTheViewerAndYesCancels) {
+  TerminalProgram viewer({MIREVO_PROGRAM, "//qmon", folder_.writeSetup(slowRun())});
+  ASSERT_TRUE(viewer.shows("of 200"));
+  viewer.type("\x03");
+  ASSERT_TRUE(viewer.shows("Cancel the run?"));
+  viewer.type("y");
+  EXPECT_EQ(viewer.wait(), 1);
+  EXPECT_THAT(viewer.output(), HasSubstr("Simulation cancelled"));
+}
+
+TEST_F(ViewerTest, ARunThatWasKilledIsFoundGone) {
+  RunningProgram run({folder_.writeSetup(slowRun())});
+  ASSERT_TRUE(reaches("basin._spi_", "COMSPD"));
+  TerminalProgram viewer(attached());
+  ASSERT_TRUE(viewer.shows("running"));
+  run.send(SIGKILL);
+  run.wait();
+  EXPECT_TRUE(viewer.shows("gone"));
+}
+
+TEST_F(ViewerTest, WithoutATerminalTheMessagesComeAsLines) {
+  RunSettings settings;
+  settings.maxEvaluations = 3;
+  const ProgramResult result = runProgram({"//qmon", folder_.writeSetup(settings)});
+  EXPECT_EQ(result.exitCode, 0);
+  EXPECT_THAT(result.output, HasSubstr("\nEvaluation of parameter set No. 2 completed: OK\nBest so far: "));
+  EXPECT_THAT(result.output, ::testing::EndsWith("-- Normal termination\n"));
+  EXPECT_THAT(result.output, Not(HasSubstr("\x1b")));
+
+  TerminalProgram dumb(attached(), {{"TERM", "dumb"}});
+  EXPECT_EQ(dumb.wait(), 0);
+  EXPECT_THAT(dumb.output(), HasSubstr("-- Normal termination"));
+  EXPECT_THAT(dumb.output(), Not(HasSubstr("\x1b")));
+
+  std::filesystem::remove(folder_.file("basin._spi_"));
+  RunningProgram interrupted({"//qmon", folder_.writeSetup(slowRun())});
+  ASSERT_TRUE(reaches("basin._spi_", "COMSPD"));
+  interrupted.send(SIGTERM);
+  EXPECT_EQ(interrupted.wait().exitCode, 128 + SIGTERM);
+  EXPECT_THAT(folder_.read("basin.log"), HasSubstr("Termination request"));
+}
+
+TEST_F(ViewerTest, WithoutASetupItSaysSo) {
+  TerminalProgram none({MIREVO_VIEWER});
+  EXPECT_EQ(none.wait(), 1);
+  EXPECT_THAT(none.output(), HasSubstr("Usage: mirevo-viewer kdx-file"));
+  TerminalProgram missing({MIREVO_VIEWER, folder_.file("missing.kdx")});
+  EXPECT_EQ(missing.wait(), 1);
+  EXPECT_THAT(missing.output(), HasSubstr("missing.kdx"));
+}
+
+}  // namespace
+}  // namespace mirevo::testing
