@@ -1,9 +1,8 @@
 #pragma once
 
-#include <memory>
 #include <string_view>
 
-#include "algorithms/search_algorithm.h"
+#include "algorithms/optimisation_driver.h"
 #include "algorithms/uniform_generator.h"
 #include "evaluation/evaluator.h"
 #include "parameters/search_space.h"
@@ -14,9 +13,10 @@ namespace mirevo {
 /// "SCE", "PSE" or "DDS"; empty for any other code.
 std::string_view searchShortName(AlgorithmType type);
 
-/// The search that the setup chooses, ready to be initialised; `evaluator` and `random` must outlive it. Reads the
-/// initial sample file where the setup names one. Throws FatalError for a search that this version does not have.
-std::unique_ptr<SearchAlgorithm> createSearch(const OptimisationConfig& config, const SearchSpace& space,
-                                              Evaluator& evaluator, UniformGenerator& random);
+/// Runs the search that the setup chooses from its start to its end; `evaluator` and `random` are used by it alone
+/// meanwhile. Reads the initial sample file where the setup names one. Dynamically Dimensioned Search is never combined
+/// with the surrogate model. Throws FatalError and RunCancelled.
+SearchSummary runConfiguredSearch(const OptimisationConfig& config, const SearchSpace& space, Evaluator& evaluator,
+                                  UniformGenerator& random, const PeriodicStep& periodicStep);
 
 }  // namespace mirevo

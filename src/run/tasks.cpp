@@ -51,10 +51,11 @@ std::string runOptimisation(const TaskContext& context) {
   if (!isKnownSearch) return std::string(kEndOfTask);
 
   UniformGenerator random(context.config.randomSeed);
-  const auto search = createSearch(optimisation, context.space, context.evaluator, random);
-  runSearch(*search, searchShortName(optimisation.algorithmType));
-
-  const SearchSummary& summary = search->summary();
+  if (optimisation.useSurrogateModel != 0 && optimisation.algorithmType == AlgorithmType::dds) {
+    context.log.warning("Dynamically Dimensioned Search runs without the surrogate model");
+  }
+  const SearchSummary summary = runConfiguredSearch(optimisation, context.space, context.evaluator, random,
+                                                    [&context](std::string_view line) { context.log.line(line); });
   context.log.line("");
   context.log.line(summary.terminationMessage);
   const std::vector<ParameterSet> best{summary.best};
@@ -141,16 +142,6 @@ std::vector<ParameterSet> scenarioSets(const RunConfig& config) {
     sets.push_back(std::move(set));
   }
   return sets;
-}
-
-void runSearch(SearchAlgorithm& search, std::string_view shortName) {
-  const auto check = [shortName](SearchStatus status) {
-    if (status == kSearchOk) return;
-    fatalError(fmt::format("Error: Invalid operation in {} algorithm", shortName),
-               fmt::format("A step of it ended with status {}.", status));
-  };
-  check(search.initialise());
-  while (!search.isTerminated()) check(search.advance());
 }
 
 }  // namespace mirevo

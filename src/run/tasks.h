@@ -34,8 +34,4 @@ std::string_view resultFileEnding(const RunConfig& config);
 /// naming run and parameter where a value cannot be transformed.
 std::vector<ParameterSet> scenarioSets(const RunConfig& config);
 
-/// Initialises and advances a search until it has ended. Throws FatalError with "Error: Invalid operation in ...
-/// algorithm" when one of its steps fails.
-void runSearch(SearchAlgorithm& search, std::string_view shortName);
-
 }  // namespace mirevo

@@ -5,6 +5,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "algorithms/optimisation_driver.h"
 #include "common/fatal_error.h"
 
 namespace mirevo {
@@ -105,22 +106,35 @@ TEST_F(TasksTest, ATaskThatDoesNotExistRunsNothingAndEndsNormally) {
   EXPECT_TRUE(evaluator_.batches.empty());
 }
 
-TEST_F(TasksTest, AfterASearchItsBestSetIsTheFinalModelRun) {
+TEST_F(TasksTest, AfterEverySearchItsBestSetIsTheFinalModelRun) {
+  const struct {
+    AlgorithmType algorithm;
+    std::int32_t surrogate;
+  } cases[] = {{AlgorithmType::dds, 0}, {AlgorithmType::dds, 1}, {AlgorithmType::sce, 0},
+               {AlgorithmType::sce, 1}, {AlgorithmType::pse, 0}, {AlgorithmType::pse, 1}};
   config_.simulationOption = SimulationOption::parameterOptimisation;
-  config_.optimisation.stopping.maxEvaluations = 60;
-  const std::string message = run();
-  EXPECT_EQ(message, "Optimisation terminated: Maximum number of model evaluations reached");
-  ASSERT_GT(evaluator_.batches.size(), 2U);
-  const std::vector<ParameterSet> last = evaluator_.batches.back();
-  ASSERT_EQ(last.size(), 1U);
-  std::size_t evaluations = 0;
-  double best = last[0].front();
-  for (const auto& batch : evaluator_.batches) {
-    evaluations += batch.size();
-    for (const ParameterSet& set : batch) best = std::min(best, set.front());
+  config_.optimisation.stopping.maxEvaluations = 90;
+  config_.optimisation.stopping.minChange = 0.0;
+  config_.optimisation.surrogate.neighbourhoodSize = 20;
+  config_.optimisation.surrogate.initialGenerations = 1;
+  for (const auto& c : cases) {
+    SCOPED_TRACE(testing::Message() << static_cast<int>(c.algorithm) << " " << c.surrogate);
+    config_.optimisation.algorithmType = c.algorithm;
+    config_.optimisation.useSurrogateModel = c.surrogate;
+    evaluator_.batches.clear();
+    EXPECT_EQ(run(), "Optimisation terminated: Maximum number of model evaluations reached");
+    ASSERT_GT(evaluator_.batches.size(), 2U);
+    const std::vector<ParameterSet> last = evaluator_.batches.back();
+    ASSERT_EQ(last.size(), 1U);
+    std::size_t evaluations = 0;
+    double best = last[0].front();
+    for (const auto& batch : evaluator_.batches) {
+      evaluations += batch.size();
+      for (const ParameterSet& set : batch) best = std::min(best, set.front());
+    }
+    EXPECT_EQ(last[0].front(), best);
+    EXPECT_EQ(evaluations, 91U) << "the budget and the final model run";
   }
-  EXPECT_EQ(last[0].front(), best);
-  EXPECT_EQ(evaluations, 61U);
 }
 
 /// Fails at a chosen step.
@@ -145,7 +159,7 @@ TEST(RunSearch, AnyStepThatFailsIsFatalWithItsAlgorithmsText) {
                                      {"DDS", "Error: Invalid operation in DDS algorithm"}}) {
       FailingSearch search(goodSteps);
       try {
-        runSearch(search, name);
+        runSearch(search, name, {});
         FAIL() << "went on";
       } catch (const FatalError& error) {
         EXPECT_EQ(error.message(), text);
