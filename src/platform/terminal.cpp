@@ -109,7 +109,7 @@ SignalQueue::~SignalQueue() {
   if (descriptor_ >= 0) ::close(descriptor_);
 }
 
-int SignalQueue::next() {
+int SignalQueue::next() const {
   signalfd_siginfo information{};
   const ssize_t size = ::read(descriptor_, &information, sizeof information);
   return size == static_cast<ssize_t>(sizeof information) ? static_cast<int>(information.ssi_signo) : 0;

@@ -58,7 +58,7 @@ class SignalQueue final {
 
   int descriptor() const { return descriptor_; }
   /// The next one, 0 when there is none.
-  int next();
+  int next() const;
 
  private:
   int descriptor_ = -1;

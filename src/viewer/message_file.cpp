@@ -8,7 +8,7 @@
 namespace mirevo {
 namespace {
 
-constexpr std::size_t kPiece = 256 * 1024;
+constexpr std::size_t kPiece = 262'144;
 constexpr std::size_t kHead = 256;
 
 class OpenFile {

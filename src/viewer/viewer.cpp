@@ -21,7 +21,7 @@ namespace {
 constexpr int kLookMilliseconds = 500;
 constexpr int kPiecesAtATime = 64;
 constexpr std::size_t kEarlierMessages = 20;  ///< shown as lines of a run that has been going before
-constexpr std::size_t kKeptOutput = 64 * 1024;
+constexpr std::size_t kKeptOutput = 65'536;
 constexpr char kControlC = 3;
 constexpr char kControlL = 12;
 constexpr char kControlZ = 26;
@@ -62,8 +62,7 @@ const ProgressState& Viewer::state() const {
 int Viewer::watch() {
   while (!leaves_) {
     readNews();
-    if (!display_->show(state(), situation_, newMessages_)) break;
-    newMessages_.clear();
+    if (hasCaughtUp_ && !showNews()) break;
     if (isOver()) break;
     waitForNews(hasMore_);
     takeSignals();
@@ -72,6 +71,12 @@ int Viewer::watch() {
   display_->close(state(), situation_);
   sayGoodbye();
   return started_ ? started_->exitCode().value_or(0) : 0;
+}
+
+bool Viewer::showNews() {
+  const bool isSeen = display_->show(state(), situation_, newMessages_);
+  newMessages_.clear();
+  return isSeen;
 }
 
 /// A run that came with its viewer is over with its process; of another one's end a screen stays until its user leaves.

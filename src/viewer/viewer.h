@@ -25,6 +25,8 @@ class Viewer final {
 
  private:
   void readNews();
+  /// False when nobody sees it any more.
+  bool showNews();
   void readRunOutput();
   void judgePresence(bool processIsGone);
   bool isOver() const;
@@ -48,7 +50,7 @@ class Viewer final {
   std::unique_ptr<Display> display_;
   std::vector<std::string> newMessages_;
   std::string runOutput_;  ///< of the started run, its end when it is long
-  bool hasCaughtUp_ = false;
+  bool hasCaughtUp_ = false;  ///< with what the file held when the viewer began; nothing is shown before
   bool hasMore_ = false;
   bool keysEnded_ = false;
   bool leaves_ = false;
