@@ -135,7 +135,7 @@ std::vector<std::string> ModelRunner::readTemplates() {
     if (!text)
       fatalError((isNumericId ? "Error: Unable to open " : "Error: Unable to open template file ") + name, reason);
     converted.push_back(isNumericId ? ConvertIdTemplate(name, *text, parameters) : std::string());
-    templates_.emplace_back(name, isNumericId ? converted.back() : *text, parameters);
+    templates_.emplace_back(name, isNumericId ? converted.back() : *text, parameters, isNumericId);
   }
   return converted;
 }
