@@ -6,25 +6,10 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include "common/descriptor.h"
+
 namespace mirevo {
 namespace {
-
-/// Closes a descriptor at the end of its scope, keeping errno.
-class Descriptor final {
- public:
-  explicit Descriptor(int fd) : fd_(fd) {}
-  ~Descriptor() {
-    const int saved = errno;
-    if (fd_ >= 0) ::close(fd_);
-    errno = saved;
-  }
-  Descriptor(const Descriptor&) = delete;
-  Descriptor& operator=(const Descriptor&) = delete;
-  int get() const { return fd_; }
-
- private:
-  int fd_;
-};
 
 bool writeAll(int fd, std::string_view content) {
   while (!content.empty()) {

@@ -35,6 +35,7 @@ struct EvaluationResult {
   std::vector<double> objectiveValues;  ///< one an objective function
   double aggregate = kFailedRunValue;   ///< what the searches minimise
   std::optional<EvaluationFailure> failure;
+  std::vector<std::string> warnings;  ///< what the log should say of the run, one line each
 
   bool ok() const { return !failure.has_value(); }
 };

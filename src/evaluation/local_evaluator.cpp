@@ -56,7 +56,9 @@ bool LocalEvaluator::takeFinished(Batch& batch) {
     if (const std::string left = runner_.launcher().leftBehind(slot); !left.empty()) {
       observer_.warning(withNumber("Evaluation of parameter set No. %: ", numberOf(set)) + left);
     }
-    finish(batch, set, runner_.collect(slot));
+    EvaluationResult result = runner_.collect(slot);
+    runner_.keepOutputFiles(slot, numberOf(set), result);
+    finish(batch, set, std::move(result));
     startNext(batch, slot);
   }
   return any;
@@ -69,6 +71,9 @@ void LocalEvaluator::finish(Batch& batch, std::size_t set, EvaluationResult resu
     outcome = result.failure->kind == EvaluationFailure::Kind::constraintsViolated
                   ? "Evaluation of parameter set No. % completed: FAILED - parameter constraints violated"
                   : "Evaluation of parameter set No. % completed: FAILED - model run error";
+  }
+  for (const std::string& text : result.warnings) {
+    observer_.warning(withNumber("Evaluation of parameter set No. %: ", result.number) + text);
   }
   observer_.message(withNumber(outcome, result.number));
   observer_.evaluationFinished(batch.sets[set], result);

@@ -12,11 +12,11 @@
 
 #include <fmt/format.h>
 
+#include "common/calendar.h"
 #include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/text.h"
 #include "measures/measure_file.h"
-#include "measures/measure_statistics.h"
 
 namespace mirevo {
 namespace {
@@ -74,10 +74,15 @@ bool exists(const std::string& path) {
 
 ModelRunner::ModelRunner(ModelDescription description, ParameterModel& parameters, ObjectiveAggregator& aggregator,
                          ProcessLauncher& launcher, const LauncherSettings& launcherSettings)
-    : description_(std::move(description)), parameters_(parameters), aggregator_(aggregator), launcher_(launcher) {
+    : description_(std::move(description)),
+      parameters_(parameters),
+      aggregator_(aggregator),
+      launcher_(launcher),
+      fewestPairs_(description_.measures.size()) {
   requireFilesInBaseFolder();
   const std::vector<std::string> converted = readTemplates();
-  series_ = SeriesTables::MirevoTSobjectInit(description_.measures);
+  series_ = SeriesTables::MirevoTSobjectInit(description_.measures, description_.period);
+  savedFiles_ = SavedFiles(description_.savedFiles, description_.baseFolder, description_.savedFolder);
   if (!launcher_.initialise(launcherSettings)) {
     fatalError("Error: Unable to initialise MirevoSimpleLaunch", launcher_.lastError());
   }
@@ -108,6 +113,7 @@ void ModelRunner::requireFilesInBaseFolder() const {
     if (measure.interfaceType == InterfaceType::timeSeries) names.push_back(measure.simulation.fileName);
   }
   if (!description_.measureFile.empty()) names.push_back(description_.measureFile);
+  names.insert(names.end(), description_.savedFiles.begin(), description_.savedFiles.end());
   for (const std::string& name : names) {
     if (name.starts_with(description_.baseFolder + "/")) continue;
     fatalError(
@@ -129,7 +135,7 @@ std::vector<std::string> ModelRunner::readTemplates() {
     if (!text)
       fatalError((isNumericId ? "Error: Unable to open " : "Error: Unable to open template file ") + name, reason);
     converted.push_back(isNumericId ? ConvertIdTemplate(name, *text, parameters) : std::string());
-    templates_.emplace_back(name, isNumericId ? converted.back() : *text, parameters);
+    templates_.emplace_back(name, isNumericId ? converted.back() : *text, parameters, isNumericId);
   }
   return converted;
 }
@@ -149,6 +155,7 @@ std::optional<EvaluationFailure> ModelRunner::prepareModelRun(std::span<const do
   // What a run did not write must never be taken for its result.
   for (const std::string& path : files.simulationFiles) removeFile(path);
   if (!files.measureFile.empty()) removeFile(files.measureFile);
+  savedFiles_.markAsOld(launcher_.getProcessFolder(slot));
   for (std::size_t i = 0; i < templates_.size(); ++i) {
     const std::string& path = files.parameterFiles[i];
     WriteParameterFile(path, templates_[i], modelValues);
@@ -171,7 +178,7 @@ EvaluationResult ModelRunner::collect(int slot) {
   result.measureValues.assign(description_.measures.size(), std::nan(""));
   auto failure = findBatchFailure(slot);
   if (!failure) failure = findMissingResults(slot);
-  if (!failure) failure = readMeasures(slot, result.measureValues);
+  if (!failure) failure = readMeasures(slot, result);
   if (failure) return failedResult(std::move(*failure));
 
   const auto isFinite = [](double value) { return std::isfinite(value); };
@@ -194,6 +201,12 @@ EvaluationResult ModelRunner::collect(int slot) {
   }
   result.aggregate = aggregator_.aggregate(result.objectiveValues);
   return result;
+}
+
+void ModelRunner::keepOutputFiles(int slot, int number, EvaluationResult& result) const {
+  for (std::string& problem : savedFiles_.save(launcher_.getProcessFolder(slot), number)) {
+    result.warnings.push_back(std::move(problem));
+  }
 }
 
 EvaluationResult ModelRunner::failedResult(EvaluationFailure failure) const {
@@ -226,7 +239,7 @@ std::optional<EvaluationFailure> ModelRunner::findMissingResults(int slot) const
   return std::nullopt;
 }
 
-std::optional<EvaluationFailure> ModelRunner::readMeasures(int slot, std::vector<double>& values) {
+std::optional<EvaluationFailure> ModelRunner::readMeasures(int slot, EvaluationResult& result) {
   const SlotFiles& files = slots_.at(static_cast<std::size_t>(slot - 1));
   std::vector<double> written;
   if (!files.measureFile.empty()) {
@@ -238,34 +251,66 @@ std::optional<EvaluationFailure> ModelRunner::readMeasures(int slot, std::vector
   if (auto unusable = series_.tryOpenSimulationFiles(files.simulationFiles)) {
     return makeFailure(Kind::resultsNotReadable, std::move(*unusable), slot);
   }
-  for (std::size_t i = 0; i < values.size(); ++i) {
+  std::optional<EvaluationFailure> failure;
+  for (std::size_t i = 0; i < result.measureValues.size() && !failure; ++i) {
     const OutputMeasure& measure = description_.measures[i];
-    if (measure.interfaceType == InterfaceType::measureFile) {
-      const auto number = static_cast<std::size_t>(measure.measurementNo);
-      if (number <= written.size()) {
-        values[i] = written[number - 1];
-        continue;
-      }
-      return makeFailure(
+    if (measure.interfaceType != InterfaceType::measureFile) {
+      failure = readSeriesMeasure(slot, i, result);
+      continue;
+    }
+    const auto number = static_cast<std::size_t>(measure.measurementNo);
+    if (number <= written.size()) {
+      result.measureValues[i] = written[number - 1];
+    } else {
+      failure = makeFailure(
           Kind::resultsNotReadable,
           fmt::format("{}: expected at least {} numbers, found {}", files.measureFile, number, written.size()), slot);
     }
-    TimeSeriesObject& simulation = series_.simulation(i);
-    if (measure.simulation.itemNo > simulation.itemCount()) {
-      return makeFailure(
-          Kind::resultsNotReadable,
-          fmt::format("{}: expected item No. {}, found {} items", slotPath(measure.simulation.fileName, slot),
-                      measure.simulation.itemNo, simulation.itemCount()),
-          slot);
-    }
-    try {
-      values[i] = measureValue(measure, description_.period, simulation, series_.observation(i));
-    } catch (const FatalError& error) {  // it names the file as the setup does
-      fatalError(error.message(), error.detail() + "\nread from " + slotPath(measure.simulation.fileName, slot));
-    }
   }
   series_.releaseSimulationFiles();
+  return failure;
+}
+
+std::optional<EvaluationFailure> ModelRunner::readSeriesMeasure(int slot, std::size_t i, EvaluationResult& result) {
+  const OutputMeasure& measure = description_.measures[i];
+  const std::string path = slotPath(measure.simulation.fileName, slot);
+  TimeSeriesObject& simulation = series_.simulation(i);
+  if (measure.simulation.itemNo > simulation.itemCount()) {
+    return makeFailure(Kind::resultsNotReadable,
+                       fmt::format("{}: expected item No. {}, found {} items", path, measure.simulation.itemNo,
+                                   simulation.itemCount()),
+                       slot);
+  }
+  try {
+    // A model that stopped early must not end the run; a setup whose period no run could ever meet does.
+    if (series_.hadPairs(i) && !hasPairs(measure, description_.period, simulation, series_.observation(i))) {
+      return makeFailure(Kind::resultsNotWritten,
+                         fmt::format("{}: item No. {} ({}) has no value at any observation time in the evaluation "
+                                     "period, as it had before the run",
+                                     path, measure.simulation.itemNo, simulation.itemName(measure.simulation.itemNo)),
+                         slot);
+    }
+    const MeasureStatistics statistics =
+        computeMeasureStatistics(measure, description_.period, simulation, series_.observation(i));
+    result.measureValues[i] = selectStatistic(statistics, measure.statisticType);
+    noteUnusedObservations(i, statistics, result);
+  } catch (const FatalError& error) {  // it names the file as the setup does
+    fatalError(error.message(), error.detail() + "\nread from " + path);
+  }
   return std::nullopt;
+}
+
+void ModelRunner::noteUnusedObservations(std::size_t i, const MeasureStatistics& statistics, EvaluationResult& result) {
+  const std::size_t pairs = statistics.simulatedValues.size();
+  std::optional<std::size_t>& fewest = fewestPairs_[i];
+  if (!statistics.firstUnused || (fewest && *fewest <= pairs)) return;
+  fewest = pairs;
+  const OutputMeasure& measure = description_.measures[i];
+  result.warnings.push_back(fmt::format(
+      "output measure \"{}\": {} of {} observations in the evaluation period are not used, as item No. {} of "
+      "{} has no value at their time; the first is at {}",
+      trimTrailing(measure.name), statistics.observationCount - pairs, statistics.observationCount,
+      measure.simulation.itemNo, trimTrailing(measure.simulation.fileName), formatDate(*statistics.firstUnused)));
 }
 
 }  // namespace mirevo

@@ -6,6 +6,8 @@
 #include <vector>
 
 #include "evaluation/evaluation_result.h"
+#include "evaluation/saved_files.h"
+#include "measures/measure_statistics.h"
 #include "measures/objective_functions.h"
 #include "measures/output_measure.h"
 #include "measures/series_tables.h"
@@ -24,6 +26,8 @@ struct ModelDescription {
   std::string measureFile;  ///< output-measure file; empty when no measure is of interface type 1
   EvaluationPeriod period;
   std::vector<ObjectiveFunction> objectives;
+  std::vector<std::string> savedFiles;  ///< kept of every model run
+  std::string savedFolder;              ///< where they are kept
 };
 
 /// Model runs in slots: writes the input, starts the batch, and turns what it wrote into a result. Used by the local
@@ -42,6 +46,10 @@ class ModelRunner final {
   /// After the slot's batch has ended: its result, with number 0. What a model run may do wrong makes a failed result;
   /// throws FatalError for what the measures cannot be computed from at all.
   EvaluationResult collect(int slot);
+
+  /// Keeps the output files of the slot's run, whose evaluation has that number; `result` is given warnings for what
+  /// could not be kept. To be called before the slot's next run.
+  void keepOutputFiles(int slot, int number, EvaluationResult& result) const;
 
   /// A result with the failed-run value in every field.
   EvaluationResult failedResult(EvaluationFailure failure) const;
@@ -66,7 +74,10 @@ class ModelRunner final {
   std::optional<EvaluationFailure> findBatchFailure(int slot) const;
   std::optional<EvaluationFailure> findMissingResults(int slot) const;
   /// Fills in the measure values, unless what the model wrote cannot be used.
-  std::optional<EvaluationFailure> readMeasures(int slot, std::vector<double>& values);
+  std::optional<EvaluationFailure> readMeasures(int slot, EvaluationResult& result);
+  std::optional<EvaluationFailure> readSeriesMeasure(int slot, std::size_t measure, EvaluationResult& result);
+  /// A warning when a run meets fewer observations than any before it: the rest of them is not judged.
+  void noteUnusedObservations(std::size_t measure, const MeasureStatistics& statistics, EvaluationResult& result);
   EvaluationFailure makeFailure(EvaluationFailure::Kind kind, std::string reason, int slot) const;
 
   ModelDescription description_;
@@ -75,7 +86,9 @@ class ModelRunner final {
   ProcessLauncher& launcher_;
   std::vector<ParameterTemplate> templates_;  ///< one a parameter file
   SeriesTables series_;
+  SavedFiles savedFiles_;
   std::vector<SlotFiles> slots_;
+  std::vector<std::optional<std::size_t>> fewestPairs_;  ///< one a measure: least that a warning was given for
 };
 
 }  // namespace mirevo

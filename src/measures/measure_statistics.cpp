@@ -60,9 +60,11 @@ std::string describeSpan(const SeriesItem& item) {
                      times.size(), formatReal(times.back() - times.front()));
 }
 
-/// Mean, rms and standard deviation over the pairs in the period. Single precision, in observation order: deliberate.
-void addPairStatistics(const SeriesItem& simulation, const SeriesItem& observation, const EvaluationPeriod& period,
-                       float weight, float weightAbove, MeasureStatistics& statistics) {
+/// Calls `use(time, observed, simulated)` for every observation in the period that is not missing, in order, with
+/// its time in days on the simulation's axis and the simulated value there, if there is one; stops when that is false.
+template <typename Use>
+void forEachObservation(const SeriesItem& simulation, const SeriesItem& observation, const EvaluationPeriod& period,
+                        const Use& use) {
   const Period days = periodOn(simulation.start, period);
   // Observation times on the simulation's axis: one offset of whole seconds, so equal civil times differ by rounding
   // only, which is far below what counts as the same time.
@@ -70,25 +72,43 @@ void addPairStatistics(const SeriesItem& simulation, const SeriesItem& observati
   const std::span<const double> times = observation.series.times();
   const std::span<const float> observed = observation.series.values(observation.item);
   std::size_t hint = 0;
-  float sum = 0.0F;
-  float sumOfSquares = 0.0F;
   for (std::size_t k = 0; k < times.size(); ++k) {
     const double time = times[k] + offset;
     if (time < days.start - kSameTimeDays) continue;
     if (time > days.end + kSameTimeDays) break;
     if (isMissing(observed[k], observation.deleteValue)) continue;
-    const std::optional<float> simulated = valueAt(simulation.series, simulation.item, time, hint);
-    if (!simulated) continue;
-    statistics.simulatedValues.push_back(*simulated);
-    const float e = weightedDifference(*simulated, observed[k], weight, weightAbove);
-    sum += e;
-    sumOfSquares += e * e;
+    if (!use(time, observed[k], valueAt(simulation.series, simulation.item, time, hint))) break;
   }
+}
+
+/// Mean, rms and standard deviation over the pairs in the period. Single precision, in observation order: deliberate.
+void addPairStatistics(const SeriesItem& simulation, const SeriesItem& observation, const EvaluationPeriod& period,
+                       float weight, float weightAbove, MeasureStatistics& statistics) {
+  float sum = 0.0F;
+  float sumOfSquares = 0.0F;
+  std::optional<double> firstUnused;
+  forEachObservation(simulation, observation, period,
+                     [&](double time, float observed, const std::optional<float>& simulated) {
+                       ++statistics.observationCount;
+                       if (!simulated) {
+                         if (!firstUnused) firstUnused = time;
+                         return true;
+                       }
+                       statistics.simulatedValues.push_back(*simulated);
+                       const float e = weightedDifference(*simulated, observed, weight, weightAbove);
+                       sum += e;
+                       sumOfSquares += e * e;
+                       return true;
+                     });
   if (statistics.simulatedValues.empty()) {
     fatalError(withNumber("Error: No simulated data found at observation times for item No. % in ", simulation.item) +
                    simulation.fileName,
                fmt::format("the evaluation period is {} to {}\n{}\n{}", formatDate(period.start),
                            formatDate(period.end), describeSpan(simulation), describeSpan(observation)));
+  }
+  if (firstUnused) {
+    constexpr double kDaySeconds = 86400.0;
+    statistics.firstUnused = dateOfSecond(secondNumber(simulation.start) + std::llround(*firstUnused * kDaySeconds));
   }
   const auto n = static_cast<float>(statistics.simulatedValues.size());
   statistics.mean = sum / n;
@@ -154,14 +174,27 @@ MeasureStatistics computeMeasureStatistics(const OutputMeasure& measure, const E
   return statistics;
 }
 
-double measureValue(const OutputMeasure& measure, const EvaluationPeriod& period, TimeSeriesObject& simulation,
-                    TimeSeriesObject& observation) {
+MeasureStatistics computeMeasureStatistics(const OutputMeasure& measure, const EvaluationPeriod& period,
+                                           TimeSeriesObject& simulation, TimeSeriesObject& observation) {
   const bool wantPeaks =
       measure.statisticType == StatisticType::peakDifference || measure.statisticType == StatisticType::lowDifference;
-  const MeasureStatistics statistics =
-      computeMeasureStatistics(measure, period, simulation, observation, static_cast<float>(measure.weight),
-                               static_cast<float>(measure.weightAbove), wantPeaks);
-  switch (measure.statisticType) {
+  return computeMeasureStatistics(measure, period, simulation, observation, static_cast<float>(measure.weight),
+                                  static_cast<float>(measure.weightAbove), wantPeaks);
+}
+
+bool hasPairs(const OutputMeasure& measure, const EvaluationPeriod& period, TimeSeriesObject& simulation,
+              TimeSeriesObject& observation) {
+  bool found = false;
+  forEachObservation(readItem(simulation, measure.simulation), readItem(observation, measure.observation), period,
+                     [&found](double, float, const std::optional<float>& simulated) {
+                       found = simulated.has_value();
+                       return !found;
+                     });
+  return found;
+}
+
+double selectStatistic(const MeasureStatistics& statistics, StatisticType type) {
+  switch (type) {
     case StatisticType::mean:
       return statistics.mean;
     case StatisticType::rootMeanSquare:
@@ -174,6 +207,11 @@ double measureValue(const OutputMeasure& measure, const EvaluationPeriod& period
       return statistics.lowDifference;
   }
   return std::numeric_limits<double>::quiet_NaN();
+}
+
+double measureValue(const OutputMeasure& measure, const EvaluationPeriod& period, TimeSeriesObject& simulation,
+                    TimeSeriesObject& observation) {
+  return selectStatistic(computeMeasureStatistics(measure, period, simulation, observation), measure.statisticType);
 }
 
 }  // namespace mirevo

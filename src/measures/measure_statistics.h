@@ -1,5 +1,7 @@
 #pragma once
 
+#include <cstddef>
+#include <optional>
 #include <vector>
 
 #include "measures/measure_file.h"
@@ -15,7 +17,9 @@ struct MeasureStatistics {
   float standardDeviation = 0.0F;
   float peakDifference = 0.0F;
   float lowDifference = 0.0F;
-  std::vector<float> simulatedValues;  ///< at the observation times that were used
+  std::vector<float> simulatedValues;     ///< at the observation times that were used
+  std::size_t observationCount = 0;       ///< in the period and not missing, used or not
+  std::optional<DateRecord> firstUnused;  ///< time of the first of them without a simulated value
 };
 
 /// Makes the item of an opened file ready for reading. Throws FatalError with "Error: Item No. % not found in " or
@@ -29,6 +33,18 @@ void requireItem(TimeSeriesObject& series, const SeriesReference& reference);
 MeasureStatistics computeMeasureStatistics(const OutputMeasure& measure, const EvaluationPeriod& period,
                                            TimeSeriesObject& simulation, TimeSeriesObject& observation, float weight,
                                            float weightAbove, bool wantPeaks);
+
+/// The same with the measure's own weights, and the peaks where its `Statistic_Type` asks for them.
+MeasureStatistics computeMeasureStatistics(const OutputMeasure& measure, const EvaluationPeriod& period,
+                                           TimeSeriesObject& simulation, TimeSeriesObject& observation);
+
+/// Whether any observation in the period meets a simulated value, so that statistics can be computed. Throws FatalError
+/// as they do for what cannot be read at all.
+bool hasPairs(const OutputMeasure& measure, const EvaluationPeriod& period, TimeSeriesObject& simulation,
+              TimeSeriesObject& observation);
+
+/// The statistic that a `Statistic_Type` selects.
+double selectStatistic(const MeasureStatistics& statistics, StatisticType type);
 
 /// The value of a measure of interface type 0: the statistic that its `Statistic_Type` selects.
 double measureValue(const OutputMeasure& measure, const EvaluationPeriod& period, TimeSeriesObject& simulation,

@@ -51,7 +51,7 @@ std::unique_ptr<TimeSeriesObject> openTimeSeries(const std::string& fileName) {
   return series;
 }
 
-SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> measures) {
+SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> measures, const EvaluationPeriod& period) {
   SeriesTables tables;
   for (const OutputMeasure& measure : measures) {
     if (measure.interfaceType != InterfaceType::timeSeries) {
@@ -71,17 +71,20 @@ SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> mea
   }
   for (const std::string& name : tables.observationNames_) tables.observations_.push_back(openTimeSeries(name));
   tables.openSimulationFiles(tables.simulationNames_);
-  tables.checkItems(measures);
+  tables.checkItems(measures, period);
   tables.releaseSimulationFiles();
   return tables;
 }
 
-void SeriesTables::checkItems(std::span<const OutputMeasure> measures) {
+void SeriesTables::checkItems(std::span<const OutputMeasure> measures, const EvaluationPeriod& period) {
+  hadPairs_.assign(measures.size(), false);
   for (std::size_t i = 0; i < measures.size(); ++i) {
     if (observationIndex_[i] == kNoSeries) continue;
     requireItem(observation(i), measures[i].observation);
     // Results of before the run that have no step yet say nothing of their columns either.
-    if (simulation(i).timeStepCount() > 0) requireItem(simulation(i), measures[i].simulation);
+    if (simulation(i).timeStepCount() < 1) continue;
+    requireItem(simulation(i), measures[i].simulation);
+    hadPairs_[i] = observation(i).timeStepCount() > 0 && hasPairs(measures[i], period, simulation(i), observation(i));
   }
 }
 

@@ -18,7 +18,7 @@ class SeriesTables final {
   /// Opens every observation file and, once as a check, every simulation file, and releases those again. Measures of
   /// interface type 1 name no series. Item numbers that a file does not have and observations that cannot be read are
   /// found here too, before a model has run. Throws FatalError with the fixed texts.
-  static SeriesTables MirevoTSobjectInit(std::span<const OutputMeasure> measures);
+  static SeriesTables MirevoTSobjectInit(std::span<const OutputMeasure> measures, const EvaluationPeriod& period);
 
   /// Opens the simulation files of one evaluation: `paths[i]` is where simulationFileNames()[i] lies in the slot's
   /// folder. Files still open are released first. Throws FatalError as openTimeSeries() does.
@@ -36,16 +36,20 @@ class SeriesTables final {
   /// The file of the measure with that 0-based index; the simulation one only between open and release.
   TimeSeriesObject& observation(std::size_t measure);
   TimeSeriesObject& simulation(std::size_t measure);
+  /// Whether the simulated series of before the run met any observation of that measure in the period: one that does
+  /// not during the run is then no fault of the setup.
+  bool hadPairs(std::size_t measure) const { return hadPairs_.at(measure); }
 
  private:
   static constexpr std::size_t kNoSeries = static_cast<std::size_t>(-1);  ///< index of a measure of interface type 1
 
-  void checkItems(std::span<const OutputMeasure> measures);
+  void checkItems(std::span<const OutputMeasure> measures, const EvaluationPeriod& period);
 
   std::vector<std::string> observationNames_;
   std::vector<std::string> simulationNames_;
   std::vector<std::size_t> observationIndex_;  ///< one a measure, 0-based
   std::vector<std::size_t> simulationIndex_;
+  std::vector<bool> hadPairs_;                     ///< one a measure
   std::vector<std::vector<int>> simulationItems_;  ///< one a simulation file: the item numbers that measures name
   std::vector<std::unique_ptr<TimeSeriesObject>> observations_;
   std::vector<std::unique_ptr<TimeSeriesObject>> simulations_;

@@ -73,11 +73,13 @@ void trimBlanksAtEnd(std::string& text) {
 }  // namespace
 
 ParameterTemplate::ParameterTemplate(std::string_view templateName, std::string_view text,
-                                     std::span<const ModelParameter> parameters)
+                                     std::span<const ModelParameter> parameters, bool isConverted)
     : templateName_(templateName), pieces_(1) {
   const std::vector<std::string_view> lines = templateLines(templateName, text);
   const char delimiter = readDelimiter(templateName, lines.empty() ? std::string_view{} : lines.front());
-  for (std::size_t i = 1; i < lines.size(); ++i) takeLine(lines[i], static_cast<int>(i) + 1, delimiter, parameters);
+  for (std::size_t i = 1; i < lines.size(); ++i) {
+    takeLine(lines[i], static_cast<int>(i) + (isConverted ? 0 : 1), delimiter, parameters);
+  }
 }
 
 void ParameterTemplate::takeLine(std::string_view line, int lineNumber, char delimiter,

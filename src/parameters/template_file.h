@@ -34,7 +34,9 @@ class ParameterTemplate final {
  public:
   /// Throws FatalError for a text without a delimiter in its first line, for a placeholder that names no parameter, and
   /// for a line that is too long. The first parameter of a name counts; trailing blanks of a name do not.
-  ParameterTemplate(std::string_view templateName, std::string_view text, std::span<const ModelParameter> parameters);
+  /// Messages count the lines of a template that was converted without the delimiter line put in front of it.
+  ParameterTemplate(std::string_view templateName, std::string_view text, std::span<const ModelParameter> parameters,
+                    bool isConverted = false);
 
   /// The parameter file's content for a full parameter vector. Every line ends in LF and has no trailing blanks.
   std::string fill(std::span<const double> modelValues) const;

@@ -8,40 +8,23 @@
 #include <dirent.h>
 #include <fcntl.h>
 #include <filesystem>
-#include <linux/fs.h>
 #include <memory>
-#include <sys/ioctl.h>
-#include <sys/sendfile.h>
 #include <sys/stat.h>
 #include <unistd.h>
 #include <vector>
 
 #include <fmt/format.h>
 
+#include "common/descriptor.h"
 #include "common/fatal_error.h"
+#include "platform/file_copy.h"
 
 namespace mirevo {
 namespace {
 
-constexpr std::size_t kCopyChunk = std::size_t{1} << 30;
-
 [[noreturn]] void fail(std::string_view what, const std::string& path, int error) {
   fatalError(fmt::format("Unable to {} {}: {}", what, path, std::strerror(error)));
 }
-
-class Descriptor final {
- public:
-  explicit Descriptor(int fd) : fd_(fd) {}
-  ~Descriptor() {
-    if (fd_ >= 0) ::close(fd_);
-  }
-  Descriptor(const Descriptor&) = delete;
-  Descriptor& operator=(const Descriptor&) = delete;
-  int get() const { return fd_; }
-
- private:
-  int fd_;
-};
 
 /// The names in a folder, sorted, without "." and "..".
 std::vector<std::string> namesIn(const std::string& path) {
@@ -100,19 +83,6 @@ void removeTree(const std::string& root) {
   }
 }
 
-/// Copies what is left between the two file offsets, by the first way that the file systems know.
-bool copyContent(int from, int to) {
-  if (::ioctl(to, FICLONE, from) == 0) return true;
-  ssize_t copied = 0;
-  while ((copied = ::copy_file_range(from, nullptr, to, nullptr, kCopyChunk, 0)) > 0) {
-  }
-  if (copied == 0) return true;
-  // Both calls advance the offsets only by what was copied, so the next way goes on where this one stopped.
-  while ((copied = ::sendfile(to, from, nullptr, kCopyChunk)) > 0) {
-  }
-  return copied == 0;
-}
-
 void copyTimes(int to, const struct stat& status) {
   const std::array<timespec, 2> times = {status.st_atim, status.st_mtim};
   ::futimens(to, times.data());  // a copy with other times is still a copy
@@ -155,10 +125,17 @@ bool isNumber(std::string_view text) {
   return !text.empty() && text.find_first_not_of("0123456789") == std::string_view::npos;
 }
 
-/// Whether the folder is a process folder of this or another run.
-bool isProcessFolder(const std::string& path, std::string_view prefix) {
+/// Whether the folder is what a run makes and not the model's: a process folder of this or another run, or the saved
+/// output files of this or an earlier run of the same setup.
+bool isMadeByRuns(const std::string& path, std::string_view prefix) {
   if (path.starts_with(prefix) && isNumber(std::string_view(path).substr(prefix.size()))) return true;
   static constexpr std::string_view kMark = "_Process";
+  static constexpr std::string_view kSaved = "_Saved";
+  if (prefix.ends_with(kMark)) {
+    const std::string saved = std::string(prefix.substr(0, prefix.size() - kMark.size())).append(kSaved);
+    if (path == saved) return true;
+    if (path.starts_with(saved + ".") && isNumber(std::string_view(path).substr(saved.size() + 1))) return true;
+  }
   const auto mark = path.rfind(kMark);
   if (mark == std::string::npos || !isNumber(std::string_view(path).substr(mark + kMark.size()))) return false;
   struct stat status {};
@@ -191,7 +168,7 @@ void makeProcessFolder(const std::string& source, const std::string& target, std
       const std::string to = target + path;
       const struct stat status = statusOf(from);
       if (isFolder(status)) {
-        if (!isProcessFolder(from, processFolderPrefix)) pending.push_back(path);
+        if (!isMadeByRuns(from, processFolderPrefix)) pending.push_back(path);
       } else if (S_ISLNK(status.st_mode)) {
         copyLink(from, to, source, target);
       } else if (S_ISREG(status.st_mode)) {

@@ -60,7 +60,7 @@ void RecordFile::close() {
 
 std::string keepEarlierFile(const std::string& path) {
   struct stat status {};
-  if (::lstat(path.c_str(), &status) != 0 || !S_ISREG(status.st_mode)) return {};
+  if (::lstat(path.c_str(), &status) != 0 || !(S_ISREG(status.st_mode) || S_ISDIR(status.st_mode))) return {};
   const std::size_t nameStart = path.rfind('/') == std::string::npos ? 0 : path.rfind('/') + 1;
   const std::size_t dot = path.rfind('.');
   const std::size_t stemEnd = dot == std::string::npos || dot <= nameStart ? path.size() : dot;

@@ -39,9 +39,9 @@ class RecordFile final {
   bool failed_ = false;
 };
 
-/// Keeps an earlier run's file from being overwritten: renames `path` to the first free of `<stem>.1<ending>`,
-/// `<stem>.2<ending>` ... and returns that name; empty when there is no regular file to keep. Throws FatalError when it
-/// cannot be renamed.
+/// Keeps an earlier run's file or folder from being overwritten: renames `path` to the first free of
+/// `<stem>.1<ending>`, `<stem>.2<ending>` ... and returns that name; empty when there is nothing to keep, or something
+/// that is neither (a device). Throws FatalError when it cannot be renamed.
 std::string keepEarlierFile(const std::string& path);
 
 }  // namespace mirevo

@@ -29,7 +29,7 @@ std::string environmentValue(const char* name) {
   return value == nullptr ? std::string{} : std::string(value);
 }
 
-ModelDescription describeModel(const RunConfig& config) {
+ModelDescription describeModel(const RunConfig& config, const std::string& filePrefix) {
   ModelDescription model;
   model.baseFolder = config.baseFolder;
   model.fileTag = config.setupName;
@@ -38,6 +38,8 @@ ModelDescription describeModel(const RunConfig& config) {
   model.measureFile = config.measureFile;
   model.period = config.period;
   model.objectives = config.objectives;
+  model.savedFiles = config.savedOutputFiles;
+  model.savedFolder = filePrefix + "_Saved";
   return model;
 }
 
@@ -114,16 +116,13 @@ void RunDriver::buildModel() {
   aggregator_ = std::make_unique<ObjectiveAggregator>(config_.objectives, config_.aggregationMethod);
   launcher_ = std::make_unique<PosixProcessLauncher>();
   signalState.haltProcesses = haltProcessesFromSignal;
-  runner_ = std::make_unique<ModelRunner>(describeModel(config_), *parameters_, *aggregator_, *launcher_,
+  runner_ = std::make_unique<ModelRunner>(describeModel(config_, filePrefix_), *parameters_, *aggregator_, *launcher_,
                                           launcherSettings(config_, filePrefix_));
 }
 
 void RunDriver::logSetup() {
   state_.log.line("");
   state_.log.line(setupSummary(config_, parameters_->searchSpace(), parameters_->evaluationOrder()));
-  if (!config_.savedOutputFiles.empty()) {
-    state_.log.warning("SAVE_OUTPUT_FILES: this version does not keep output files of every evaluation");
-  }
   for (const ParameterTemplate& parameterTemplate : runner_->templates()) {
     for (const std::string& text : parameterTemplate.narrowPlaceholderWarnings(config_.parameters)) {
       state_.log.warning(text);
@@ -139,6 +138,9 @@ void RunDriver::openResults() {
   failedRunFile_ = std::make_unique<FailedRunFile>(failedRunPath, config_.setupName, space.names);
 
   openResultFile();
+  if (const std::string kept = keepEarlierFile(filePrefix_ + "_Saved"); !kept.empty()) {
+    state_.log.line("The saved output files of the earlier run were kept as " + kept);
+  }
   reporter_ = std::make_unique<RunReporter>(state_, results_, *failedRunFile_, space);
   failedRunPolicy_.emplace(config_.plannedEvaluations());
   evaluator_ =

@@ -52,6 +52,22 @@ TEST_F(LocalEvaluatorTest, OneSlotRunsOneSetAfterAnother) {
   EXPECT_DOUBLE_EQ(launcher.longestWait, 3.0);
 }
 
+TEST_F(LocalEvaluatorTest, EverySetsOutputIsSavedUnderItsNumberAndWarningsNameTheSet) {
+  description_.savedFiles = {folder_ / "base/simulated.csv"};
+  description_.savedFolder = folder_ / "run_Saved";
+  FakeLauncher launcher([&](int start, const std::string&) { return start == 2 ? fails(1.0) : computes(3.0); });
+  LocalEvaluator& evaluator = makeEvaluator(launcher, 2, 100);
+  evaluator.evaluateParameterSets(std::vector<ParameterSet>{{2.0}, {4.0}}, DispatchMode::task);
+  evaluator.evaluateParameterSets(std::vector<ParameterSet>{{9.0}, {6.0}}, DispatchMode::task);
+  EXPECT_EQ(folder_.read("run_Saved/1/simulated.csv"), series(2.0));
+  EXPECT_FALSE(folder_.exists("run_Saved/2/simulated.csv"));
+  EXPECT_FALSE(folder_.exists("run_Saved/3"));  // not run
+  EXPECT_EQ(folder_.read("run_Saved/4/simulated.csv"), series(6.0));
+  EXPECT_THAT(observer_.events,
+              testing::Contains("warning: Evaluation of parameter set No. 2: " +
+                                (folder_ / "run_Process2/simulated.csv") + " was not kept: No such file or directory"));
+}
+
 TEST_F(LocalEvaluatorTest, ResultsStandInTheOrderOfTheSetsWhateverEndsFirst) {
   const std::vector<double> seconds = {5.0, 1.0, 3.0, 1.5, 1.0, 0.0, 2.0};
   FakeLauncher launcher(

@@ -137,6 +137,86 @@ TEST_F(ModelRunTest, MeasuresThatCannotBeComputedEndTheRunNamingTheSlotsFile) {
   }
 }
 
+TEST_F(ModelRunTest, ARunThatStopsBeforeThePeriodIsAFailedEvaluation) {
+  description_.period = {{2001, 1, 3}, {2001, 12, 31}};
+  for (const StatisticType statistic : {StatisticType::rootMeanSquare, StatisticType::peakDifference}) {
+    description_.measures[0].statisticType = statistic;
+    makeRunner(launcher_, 1);
+    writes("simulated.csv", "time,flow\n2001-01-01,1\n2001-01-02,1\n");
+    const EvaluationResult result = evaluate(2.0);
+    ASSERT_FALSE(result.ok());
+    EXPECT_EQ(result.failure->kind, Kind::resultsNotWritten);
+    EXPECT_EQ(result.failure->reason, (folder_ / "run_Process1/simulated.csv") +
+                                          ": item No. 1 (flow) has no value at any observation time in the evaluation "
+                                          "period, as it had before the run");
+    writes("simulated.csv", series(4.0));
+    EXPECT_THAT(evaluate(2.0).measureValues, ElementsAre(3.0));
+  }
+}
+
+TEST_F(ModelRunTest, ARunThatMeetsFewerObservationsThanAnyBeforeIsNamedInAWarning) {
+  makeRunner(launcher_, 1);
+  const struct {
+    const char* simulated;
+    const char* warning;  ///< its part that differs; none when empty
+  } cases[] = {{"2001-01-01,4\n2001-01-02,4\n2001-01-03,4\n2001-01-04,4\n2001-01-05,4\n", ""},
+               {"2001-01-01,4\n2001-01-02,4\n2001-01-03,4\n2001-01-04,4\n", "1 of 5 observations"},
+               {"2001-01-01,4\n2001-01-02,4\n2001-01-03,4\n2001-01-04,NaN\n2001-01-05,4\n", ""},
+               {"2001-01-01,4\n2001-01-02,4\n", "3 of 5 observations"},
+               {"2001-01-01,4\n2001-01-02,4\n", ""}};
+  for (const auto& c : cases) {
+    writes("simulated.csv", std::string("time,flow\n") + c.simulated);
+    const EvaluationResult result = evaluate(2.0);
+    EXPECT_THAT(result.measureValues, ElementsAre(3.0));  // judged on what there is
+    if (*c.warning == '\0') {
+      EXPECT_THAT(result.warnings, testing::IsEmpty()) << c.simulated;
+    } else {
+      EXPECT_THAT(result.warnings,
+                  ElementsAre(testing::StartsWith(std::string("output measure \"bias\": ") + c.warning)));
+    }
+  }
+  writes("simulated.csv", "time,flow\n2001-01-01,4\n");
+  EXPECT_THAT(
+      evaluate(2.0).warnings,
+      ElementsAre("output measure \"bias\": 4 of 5 observations in the evaluation period "
+                  "are not used, as item No. 1 of " +
+                  (folder_ / "base/simulated.csv") + " has no value at their time; the first is at 2001-01-02 00:00"));
+}
+
+TEST_F(ModelRunTest, SavedFilesAreThoseThatTheRunWrote) {
+  folder_.write("base/out/state.txt", "from before");
+  description_.savedFiles = {folder_ / "base/simulated.csv", folder_ / "base/out/state.txt",
+                             folder_ / "base/parameters.txt", folder_ / "base/none.txt"};
+  description_.savedFolder = folder_ / "run_Saved";
+  makeRunner(launcher_, 1);
+  const auto notKept = [this](const std::string& name) {
+    return testing::StartsWith((folder_ / "run_Process1") + "/" + name + " was not kept: ");
+  };
+  // Before the first run the file is the base folder's copy, before the second the first run's.
+  writes("simulated.csv", series(4.0));
+  for (const int number : {1, 4}) {
+    EvaluationResult result = evaluate(2.0 + number);
+    runner_->keepOutputFiles(1, number, result);
+    EXPECT_THAT(result.warnings, ElementsAre(notKept("out/state.txt"), notKept("none.txt")));
+    const std::string folder = fmt::format("run_Saved/{}/", number);
+    EXPECT_EQ(folder_.read(folder + "simulated.csv"), series(4.0));
+    EXPECT_THAT(folder_.read(folder + "parameters.txt"), testing::EndsWith(fmt::format(" {}\n", 2 + number)));
+    EXPECT_FALSE(folder_.exists(folder + "out/state.txt"));
+  }
+  writes("out/state.txt", "by the run");
+  EvaluationResult result = evaluate(2.0);
+  runner_->keepOutputFiles(1, 8, result);
+  EXPECT_EQ(folder_.read("run_Saved/8/out/state.txt"), "by the run");
+  // A folder in the place of the copy: the warning names the file and the reason, and nothing half-written stays.
+  std::filesystem::create_directories(folder_ / "run_Saved/9/simulated.csv/x");
+  writes("simulated.csv", series(4.0));
+  result = evaluate(2.0);
+  runner_->keepOutputFiles(1, 9, result);
+  EXPECT_THAT(result.warnings,
+              testing::Contains((folder_ / "run_Process1/simulated.csv") + " was not kept: Is a directory"));
+  EXPECT_FALSE(folder_.exists("run_Saved/9/simulated.csv.part"));
+}
+
 TEST_F(ModelRunTest, NumericIdTemplatesAreConvertedIntoTheSlotsAlone) {
   folder_.write("base/parameters.tpl", "a = 1.5E-035\n");
   description_.parameterFiles[0].fileType = kNumericIdTemplate;

@@ -23,6 +23,7 @@ struct RunSettings {
   std::string templateFile = "model/parameters.tpl";
   std::string simulationFile = "model/simulated.csv";
   std::string observationFile = "observed.csv";
+  std::string savedFile = {};  ///< an output file that is kept of every evaluation; none when empty
 };
 
 /// A folder with the model, its observations (made with a = 5, b = 2, c = 1) and a setup file `basin.kdx`. Parameters:
@@ -65,6 +66,13 @@ class ModelFolder : public TemporaryFolder {
   [/SCENARIOS]
 )",
                        settings.scenarios.empty() ? 0 : 1, settings.scenarios.size(), items);
+  }
+
+  static std::string savedText(const RunSettings& settings) {
+    const std::string item =
+        fmt::format("    [OUTPUT_FILE_1]\n      File_name = '{}'\n    [/OUTPUT_FILE_1]\n", settings.savedFile);
+    return fmt::format("  [SAVE_OUTPUT_FILES]\n    TqSEKdxListItemCount = {}\n{}  [/SAVE_OUTPUT_FILES]\n",
+                       settings.savedFile.empty() ? 0 : 1, settings.savedFile.empty() ? "" : item);
   }
 
   static std::string parameterText(int number, const char* name, double initial, double upper, int type) {
@@ -150,11 +158,9 @@ class ModelFolder : public TemporaryFolder {
       [/OBJECTIVE_1]
     [/OBJECTIVE_FUNCTIONS]
   [/ObjectiveFunctions]
-  [SAVE_OUTPUT_FILES]
-    TqSEKdxListItemCount = 0
-  [/SAVE_OUTPUT_FILES]
 )",
                         settings.simulationFile, settings.observationFile);
+    text += savedText(settings);
     text += scenarioText(settings);
     text += fmt::format(R"(  [OPTIMISATION_ALGORITHM]
     Algorithm_Type = 2

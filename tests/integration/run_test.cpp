@@ -114,6 +114,30 @@ TEST(Uncertainty, TheSampleIsTheSameWithOneSlotAndWithThree) {
   EXPECT_THAT(folder.read("basin.log"), HasSubstr("40 model evaluations, 0 of them failed"));
 }
 
+TEST(SavedOutput, EveryEvaluationKeepsItsOwnAndAnEarlierRunsIsNotMixedIn) {
+  const ModelFolder folder;
+  RunSettings settings{.option = 0,
+                       .scenarios = {"1, 1, 1", "2, 1, 1", "3, 1, 1"},
+                       .slots = 2,
+                       .modelArguments = "--write half",
+                       .savedFile = "model/simulated.csv"};
+  ASSERT_EQ(runProgram({folder.writeSetup(settings)}).exitCode, 0);
+  for (const int number : {1, 2, 3}) {
+    EXPECT_THAT(folder.read(fmt::format("basin_Saved/{}/simulated.csv", number)),
+                StartsWith(fmt::format("time,simulated\n2001-01-01,{}\n", number)));
+  }
+  // Half of each series is missing; the first run to finish says so, once.
+  const std::string log = folder.read("basin.log");
+  const auto warning = log.find("observations in the evaluation period are not used");
+  EXPECT_NE(warning, std::string::npos);
+  EXPECT_EQ(log.find("are not used", warning + 60), std::string::npos);
+
+  settings.scenarios = {"4, 1, 1"};
+  ASSERT_EQ(runProgram({folder.writeSetup(settings)}).exitCode, 0);
+  EXPECT_TRUE(folder.has("basin_Saved.1/3/simulated.csv"));
+  EXPECT_FALSE(folder.has("basin_Saved/2"));
+}
+
 TEST(FailedRuns, ASingleRunThatFailsEndsTheRunWithTheReason) {
   const ModelFolder folder;
   const ProgramResult result = runProgram({folder.writeSetup({.option = 0, .modelArguments = "--fail-above 3"})});

@@ -14,6 +14,8 @@ namespace {
 using ::testing::ElementsAre;
 using ::testing::HasSubstr;
 
+const EvaluationPeriod kPeriod{{2001, 1, 1}, {2001, 12, 31}};
+
 class SeriesTablesTest : public ::testing::Test {
  protected:
   void SetUp() override {
@@ -36,7 +38,7 @@ class SeriesTablesTest : public ::testing::Test {
   }
   void expectFatal(const OutputMeasure& m, const std::string& message, const std::string& detail) const {
     try {
-      SeriesTables::MirevoTSobjectInit(std::vector{m});
+      SeriesTables::MirevoTSobjectInit(std::vector{m}, kPeriod);
       ADD_FAILURE() << "accepted: " << message;
     } catch (const FatalError& error) {
       EXPECT_EQ(error.message(), message);
@@ -54,7 +56,7 @@ TEST_F(SeriesTablesTest, MeasuresShareTheFilesTheyNameAlike) {
   fromFile.simulation.fileName = path("not there");
   const std::vector<OutputMeasure> measures{measure("sim2.csv", "obs.csv"), fromFile, measure("sim.csv", "obs.csv  "),
                                             measure("sim2.csv  ", "obs.csv")};
-  SeriesTables tables = SeriesTables::MirevoTSobjectInit(measures);
+  SeriesTables tables = SeriesTables::MirevoTSobjectInit(measures, kPeriod);
   EXPECT_THAT(tables.observationFileNames(), ElementsAre(path("obs.csv")));
   EXPECT_THAT(tables.simulationFileNames(), ElementsAre(path("sim2.csv"), path("sim.csv")));
   EXPECT_EQ(&tables.observation(0), &tables.observation(2));
@@ -77,7 +79,7 @@ TEST_F(SeriesTablesTest, SetupFailuresEndTheRun) {
 }
 
 TEST_F(SeriesTablesTest, UnusableResultsOfARunAreAReasonAndNoError) {
-  SeriesTables tables = SeriesTables::MirevoTSobjectInit(std::vector{measure("sim.csv", "obs.csv", 2)});
+  SeriesTables tables = SeriesTables::MirevoTSobjectInit(std::vector{measure("sim.csv", "obs.csv", 2)}, kPeriod);
   struct Case {
     const char* content;
     std::string reason;  // empty: usable

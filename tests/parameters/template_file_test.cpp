@@ -16,6 +16,7 @@ namespace {
 
 using ::testing::ElementsAre;
 using ::testing::HasSubstr;
+using ::testing::StartsWith;
 
 std::vector<ModelParameter> parameters() {
   const auto make = [](std::string name, double id, double initial, double lower, double upper) {
@@ -170,6 +171,9 @@ TEST(ParameterTemplate, WarnsOfNarrowPlaceholders) {
       "t:3: the placeholder of parameter \"K\" is 3 characters wide and keeps fewer than four significant digits: "
       "0.5 is written as \"E-0\"; make it 9 wide, delimiters included, by blanks behind the name");
   EXPECT_THAT(warnings("!K     !"), ElementsAre(HasSubstr("make it 9 wide"))) << "8 columns: 1.23E-02";
+  const ParameterTemplate converted("t", "!\n1!K        !", parameters(), true);
+  EXPECT_THAT(converted.narrowPlaceholderWarnings(parameters()), ElementsAre(StartsWith("t:1: ")))
+      << "the user's template has no delimiter line";
   EXPECT_THAT(warnings("1!K        !"), ElementsAre(HasSubstr("touched by \"1\"")));
   EXPECT_THAT(warnings("-!K        !0"), ElementsAre(HasSubstr("touched by \"-\"")));
   EXPECT_THAT(warnings("!K        !0"), ElementsAre(HasSubstr("touched by \"0\"")));

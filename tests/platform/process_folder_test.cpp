@@ -87,14 +87,17 @@ TEST(ProcessFolder, LinksLeadWhereTheyShould) {
   for (const auto& c : cases) EXPECT_EQ(fs::read_symlink(copy + c.name).string(), c.target) << c.name;
 }
 
-// A setup that lies in the model's own folder has its process folders in what it copies.
-TEST(ProcessFolder, NeverCopiesProcessFolders) {
+// A setup that lies in the model's own folder has what its runs make in what it copies.
+TEST(ProcessFolder, NeverCopiesWhatRunsMake) {
   const TemporaryFolder folder;
   folder.write("run.sh", "");
   folder.write("cal_Process2/big.dat", "");                             // of this run
   folder.write("other_Process1/" + std::string(kBatchLogName), "log");  // of another setup's run
   folder.write("my_Process1/data.txt", "mine");                         // somebody's own: no batch log
   folder.write("cal_Processes/data.txt", "mine");
+  folder.write("cal_Saved/1/out.csv", "");
+  folder.write("cal_Saved.12/1/out.csv", "");
+  folder.write("cal_Saved.old/data.txt", "mine");
   for (int round = 0; round < 2; ++round)
     makeProcessFolder(folder.path(), folder / "cal_Process1", folder / "cal_Process");
 
@@ -102,6 +105,9 @@ TEST(ProcessFolder, NeverCopiesProcessFolders) {
   EXPECT_FALSE(folder.exists("cal_Process1/cal_Process1"));
   EXPECT_FALSE(folder.exists("cal_Process1/cal_Process2"));
   EXPECT_FALSE(folder.exists("cal_Process1/other_Process1"));
+  EXPECT_FALSE(folder.exists("cal_Process1/cal_Saved"));
+  EXPECT_FALSE(folder.exists("cal_Process1/cal_Saved.12"));
+  EXPECT_TRUE(folder.exists("cal_Process1/cal_Saved.old/data.txt"));
   EXPECT_TRUE(folder.exists("cal_Process1/my_Process1/data.txt"));
   EXPECT_TRUE(folder.exists("cal_Process1/cal_Processes/data.txt"));
 }

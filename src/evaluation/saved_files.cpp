@@ -1,0 +1,69 @@
+#include "evaluation/saved_files.h"
+
+#include <array>
+#include <cerrno>
+#include <cstring>
+#include <fcntl.h>
+#include <filesystem>
+#include <sys/stat.h>
+#include <system_error>
+#include <utility>
+
+#include <fmt/format.h>
+
+#include "common/text.h"
+#include "platform/file_copy.h"
+
+namespace mirevo {
+namespace {
+
+/// Time of last change that marks a file of before the run: one second after the epoch, which no model's file has. A
+/// comparison with the time at which the run began would depend on the clock and its grain.
+constexpr timespec kOldMark{1, 0};
+
+bool isMarked(const struct stat& status) {
+  return status.st_mtim.tv_sec == kOldMark.tv_sec && status.st_mtim.tv_nsec == kOldMark.tv_nsec;
+}
+
+}  // namespace
+
+SavedFiles::SavedFiles(const std::vector<std::string>& files, const std::string& baseFolder, std::string folder)
+    : folder_(std::move(folder)) {
+  for (const std::string& file : files) names_.emplace_back(trimTrailing(file).substr(baseFolder.size()));
+}
+
+void SavedFiles::markAsOld(const std::string& processFolder) const {
+  const std::array<timespec, 2> times{timespec{0, UTIME_OMIT}, kOldMark};
+  // One that is not there needs no mark; one that cannot be marked is taken for the run's, as is one behind a link,
+  // which may lie outside the process folder.
+  for (const std::string& name : names_) {
+    ::utimensat(AT_FDCWD, (processFolder + name).c_str(), times.data(), AT_SYMLINK_NOFOLLOW);
+  }
+}
+
+std::vector<std::string> SavedFiles::save(const std::string& processFolder, int number) const {
+  std::vector<std::string> problems;
+  for (const std::string& name : names_) {
+    const std::string source = processFolder + name;
+    const std::string target = fmt::format("{}/{}{}", folder_, number, name);
+    std::string reason;
+    struct stat status {};
+    if (::stat(source.c_str(), &status) != 0) {
+      reason = std::strerror(errno);
+    } else if (isMarked(status)) {
+      reason = "the model run did not write it";
+    } else {
+      std::error_code failed;
+      std::filesystem::create_directories(std::filesystem::path(target).parent_path(), failed);
+      if (failed) {
+        reason = fmt::format("{}: {}", std::filesystem::path(target).parent_path().string(), failed.message());
+      } else if (copyWhole(source, target, reason)) {
+        continue;
+      }
+    }
+    problems.push_back(fmt::format("{} was not kept: {}", source, reason));
+  }
+  return problems;
+}
+
+}  // namespace mirevo
