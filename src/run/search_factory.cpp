@@ -33,8 +33,9 @@ std::string_view searchShortName(AlgorithmType type) {
 
 std::unique_ptr<SearchAlgorithm> createSearch(const OptimisationConfig& config, const SearchSpace& space,
                                               Evaluator& evaluator, UniformGenerator& random) {
-  if (config.useSurrogateModel != 0)
+  if (config.useSurrogateModel != 0 && config.algorithmType != AlgorithmType::dds) {
     notAvailable("surrogate-assisted " + std::string(searchShortName(config.algorithmType)));
+  }
   SearchBounds bounds = searchBounds(space);
   if (config.algorithmType == AlgorithmType::dds) {
     return std::make_unique<Dds>(config.dds, config.stopping.maxEvaluations,
