@@ -13,6 +13,7 @@
 #include "run/mpi_start.h"
 #include "run/setup_reader.h"
 #include "run/setup_summary.h"
+#include "run/setup_warnings.h"
 #include "run/signal_handlers.h"
 #include "run/signal_state.h"
 #include "run/tasks.h"
@@ -70,7 +71,8 @@ int RunDriver::run(const std::string& setupFileName) {
     state_.progress.writeMessage("Title: " + config_.title);
     state_.progress.writeStatus(taskName(config_));
     state_.progress.progressEvaluationLabel(config_.plannedEvaluations());
-    finish(runTask({config_, parameters_->searchSpace(), *evaluator_, state_.log}));
+    finish(runTask({config_, parameters_->searchSpace(), *evaluator_, state_.log,
+                    [this](const SearchSummary& summary) { reporter_->takeBestOf(summary); }}));
     return 0;
   } catch (const FatalError& error) {
     return endInError(error.message(), error.detail());
@@ -123,6 +125,9 @@ void RunDriver::logSetup() {
   state_.log.line(setupSummary(config_, parameters_->searchSpace(), parameters_->evaluationOrder()));
   if (!config_.savedOutputFiles.empty()) {
     state_.log.warning("SAVE_OUTPUT_FILES: this version does not keep output files of every evaluation");
+  }
+  for (const std::string& text : unusedParameterWarnings(config_.parameters, runner_->templates())) {
+    state_.log.warning(text);
   }
   for (const ParameterTemplate& parameterTemplate : runner_->templates()) {
     for (const std::string& text : parameterTemplate.narrowPlaceholderWarnings(config_.parameters)) {
