@@ -138,6 +138,7 @@ void RunDriver::logSetup() {
 }
 
 void RunDriver::openResults() {
+  state_.objectiveValues.resize(config_.objectives.size());
   const SearchSpace& space = parameters_->searchSpace();
   const std::string failedRunPath = std::filesystem::path(filePrefix_).replace_filename("calSimErr.dat").string();
   keepEarlierFile(failedRunPath);
@@ -148,7 +149,6 @@ void RunDriver::openResults() {
   failedRunPolicy_.emplace(config_.plannedEvaluations());
   evaluator_ =
       std::make_unique<LocalEvaluator>(*runner_, *reporter_, *failedRunPolicy_, config_.simultaneousSimulations);
-  state_.objectiveValues.resize(config_.objectives.size());
 }
 
 void RunDriver::openResultFile() {

@@ -1,6 +1,6 @@
 #include "run/setup_summary.h"
 
-#include <gtest/gtest.h>
+#include <gmock/gmock.h>
 
 #include "run/setup_fixture.h"
 
@@ -40,6 +40,21 @@ TEST_F(SetupSummaryTest, SaysWhatTheRunIsAboutToDo) {
       "Random seed: -77\n"
       "Model evaluations planned: 500\n"
       "Simultaneous simulations: 4");
+}
+
+TEST(TaskName, SaysWhatIsRun) {
+  RunConfig config;
+  const auto name = [&config](SimulationOption option) {
+    config.simulationOption = option;
+    return taskName(config);
+  };
+  EXPECT_EQ(name(SimulationOption::scenarioRuns), "Scenario runs: Single run using initial parameter set");
+  config.scenario.scenarioType = 1;
+  EXPECT_EQ(name(SimulationOption::scenarioRuns), "Scenario runs: Multiple runs");
+  EXPECT_THAT(name(SimulationOption::sensitivityAnalysis),
+              testing::StartsWith("Sensitivity analysis: Local sensitivity analysis"));
+  EXPECT_THAT(name(SimulationOption::uncertaintyAnalysis), testing::StartsWith("Uncertainty analysis"));
+  EXPECT_EQ(name(static_cast<SimulationOption>(4)), "none");
 }
 
 }  // namespace
