@@ -214,7 +214,8 @@ double Calibration::runProgram(int count) {
   const auto start = Clock::now();
   pid_t process = 0;
   int status = 0;
-  if (posix_spawn(&process, program.c_str(), nullptr, nullptr, arguments, environ) != 0) fatalError("the program could not be started", program);
+  if (posix_spawn(&process, program.c_str(), nullptr, nullptr, arguments, environ) != 0)
+    fatalError("the program could not be started", program);
   if (waitpid(process, &status, 0) != process || status != 0) fatalError("the program failed: see its log");
   return secondsSince(start) / count;
 }

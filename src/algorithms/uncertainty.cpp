@@ -35,6 +35,7 @@ std::vector<SampleSummary> summariseColumns(std::size_t count, const ValuesOf& v
     for (std::size_t j = 0; j < values.size(); ++j) columns[j].push_back(values[j]);
   }
   std::vector<SampleSummary> summaries;
+  summaries.reserve(columns.size());
   for (const std::vector<double>& column : columns) summaries.push_back(summariseSample(column));
   return summaries;
 }

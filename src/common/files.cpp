@@ -23,19 +23,29 @@ bool writeAll(int fd, std::string_view content) {
   return true;
 }
 
+/// Why something on disk is no file to read or write: reading a device or a pipe may never end. Empty for a file.
+std::string faultOfKind(const struct stat& status) {
+  if (S_ISREG(status.st_mode)) return {};
+  return S_ISDIR(status.st_mode) ? std::strerror(EISDIR) : "Not a regular file";
+}
+
 }  // namespace
 
+std::string faultOfFile(const std::string& path) {
+  struct stat status {};
+  return ::stat(path.c_str(), &status) == 0 ? faultOfKind(status) : std::strerror(errno);
+}
+
 std::optional<std::string> readTextFile(const std::string& path, std::string& reason) {
-  const Descriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC));
+  // Without O_NONBLOCK the opening of a pipe would wait for its writer.
+  const Descriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
   struct stat status {};
   if (file.get() < 0 || ::fstat(file.get(), &status) != 0) {
     reason = std::strerror(errno);
     return std::nullopt;
   }
-  if (S_ISDIR(status.st_mode)) {
-    reason = std::strerror(EISDIR);
-    return std::nullopt;
-  }
+  reason = faultOfKind(status);
+  if (!reason.empty()) return std::nullopt;
   std::string content;
   content.resize(static_cast<std::size_t>(status.st_size));
   std::size_t size = 0;

@@ -6,8 +6,12 @@
 
 namespace mirevo {
 
+/// Why there is no file at `path` ("No such file or directory", "Is a directory", "Not a regular file" of a device or
+/// pipe); empty where there is one.
+std::string faultOfFile(const std::string& path);
+
 /// The whole content of a file, or nothing with the system's reason in `reason` ("No such file or directory").
-/// A folder is refused like a file that cannot be read.
+/// Folders, devices and pipes are refused like a file that cannot be read.
 std::optional<std::string> readTextFile(const std::string& path, std::string& reason);
 
 /// Text files that are written often and whole: removes `path` and creates it anew with `mode` and `content`. On ext4

@@ -1,7 +1,3 @@
-#include <cerrno>
-#include <cstring>
-#include <sys/stat.h>
-
 #include <fmt/format.h>
 
 #include "common/fatal_error.h"
@@ -17,18 +13,8 @@ std::string shown(const std::string& path, std::string_view keyword, const Setup
   return written.empty() ? path : written;
 }
 
-/// Why there is no file to read at `path`; empty where there is one. Devices and pipes are none: a read of them may
-/// never end.
-std::string faultOfFile(const std::string& path) {
-  struct stat status {};
-  if (path.empty()) return "expected the name of a file, found a blank text";
-  std::string reason;
-  if (::stat(path.c_str(), &status) != 0) {
-    reason = std::strerror(errno);
-  } else if (!S_ISREG(status.st_mode)) {
-    reason = S_ISDIR(status.st_mode) ? std::strerror(EISDIR) : "Not a regular file";
-  }
-  return reason.empty() ? reason : fmt::format("{}: {}", path, reason);
+std::string explained(const std::string& path, std::string_view reason) {
+  return path.empty() ? "expected the name of a file, found a blank text" : fmt::format("{}: {}", path, reason);
 }
 
 }  // namespace
@@ -36,18 +22,15 @@ std::string faultOfFile(const std::string& path) {
 void validateFileExists(const std::string& path, std::string_view keyword, const SetupSection& section) {
   const std::string fault = faultOfFile(path);
   if (fault.empty()) return;
-  section.refuse(fmt::format("Error: The file {} does not exist", shown(path, keyword, section)), keyword, fault);
+  section.refuse(fmt::format("Error: The file {} does not exist", shown(path, keyword, section)), keyword,
+                 explained(path, fault));
 }
 
 void validateFileOpens(const std::string& path, std::string_view keyword, const SetupSection& section,
                        std::string_view message) {
-  std::string fault = faultOfFile(path);
-  if (fault.empty()) {
-    std::string reason;
-    if (readTextFile(path, reason)) return;
-    fault = fmt::format("{}: {}", path, reason);
-  }
-  section.refuse(fmt::format("{}{}", message, shown(path, keyword, section)), keyword, fault);
+  std::string reason;
+  if (readTextFile(path, reason)) return;
+  section.refuse(fmt::format("{}{}", message, shown(path, keyword, section)), keyword, explained(path, reason));
 }
 
 void validateInBaseFolder(const std::string& path, const std::string& baseFolder, std::string_view keyword,

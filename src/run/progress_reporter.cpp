@@ -22,7 +22,9 @@ constexpr std::size_t kSpeedWindow = 100;  ///< evaluations
 
 std::string baseNameOf(std::string_view runFileName) {
   for (const std::string_view ending : {".log", ".inp"}) {
-    if (runFileName.ends_with(ending)) runFileName.remove_suffix(ending.size());
+    if (!runFileName.ends_with(ending)) continue;
+    runFileName.remove_suffix(ending.size());
+    break;  // what is left may be called "basin.inp"
   }
   return std::string(runFileName);
 }

@@ -13,6 +13,7 @@
 #include "run/mpi_start.h"
 #include "run/setup_reader.h"
 #include "run/setup_summary.h"
+#include "run/setup_warnings.h"
 #include "run/signal_handlers.h"
 #include "run/signal_state.h"
 #include "run/tasks.h"
@@ -72,7 +73,8 @@ int RunDriver::run(const std::string& setupFileName) {
     state_.progress.writeMessage("Title: " + config_.title);
     state_.progress.writeStatus(taskName(config_));
     state_.progress.progressEvaluationLabel(config_.plannedEvaluations());
-    finish(runTask({config_, parameters_->searchSpace(), *evaluator_, state_.log}));
+    finish(runTask({config_, parameters_->searchSpace(), *evaluator_, state_.log,
+                    [this](const SearchSummary& summary) { reporter_->takeBestOf(summary); }}));
     return 0;
   } catch (const FatalError& error) {
     return endInError(error.message(), error.detail());
@@ -123,6 +125,9 @@ void RunDriver::buildModel() {
 void RunDriver::logSetup() {
   state_.log.line("");
   state_.log.line(setupSummary(config_, parameters_->searchSpace(), parameters_->evaluationOrder()));
+  for (const std::string& text : unusedParameterWarnings(config_.parameters, runner_->templates())) {
+    state_.log.warning(text);
+  }
   for (const ParameterTemplate& parameterTemplate : runner_->templates()) {
     for (const std::string& text : parameterTemplate.narrowPlaceholderWarnings(config_.parameters)) {
       state_.log.warning(text);
@@ -132,6 +137,7 @@ void RunDriver::logSetup() {
 }
 
 void RunDriver::openResults() {
+  state_.objectiveValues.resize(config_.objectives.size());
   const SearchSpace& space = parameters_->searchSpace();
   const std::string failedRunPath = std::filesystem::path(filePrefix_).replace_filename("calSimErr.dat").string();
   keepEarlierFile(failedRunPath);
@@ -145,7 +151,6 @@ void RunDriver::openResults() {
   failedRunPolicy_.emplace(config_.plannedEvaluations());
   evaluator_ =
       std::make_unique<LocalEvaluator>(*runner_, *reporter_, *failedRunPolicy_, config_.simultaneousSimulations);
-  state_.objectiveValues.resize(config_.objectives.size());
 }
 
 void RunDriver::openResultFile() {

@@ -38,7 +38,14 @@ void RunReporter::evaluationFinished(std::span<const double> set, const Evaluati
   }
 }
 
+void RunReporter::takeBestOf(const SearchSummary& search) {
+  if (search.best.empty() || !search.bestResult.ok()) return;
+  best_ = Best{search.bestResult.number, search.bestResult.aggregate, ToModelScale(space_, search.best)};
+  isBestOfSearch_ = true;
+}
+
 void RunReporter::considerAsBest(int number, double aggregate, const std::vector<double>& parameterValues) {
+  if (isBestOfSearch_) return;
   const bool isBetter =
       !best_ || aggregate < best_->aggregate || (aggregate == best_->aggregate && number < best_->number);
   if (!isBetter) return;

@@ -4,6 +4,7 @@
 #include <string>
 #include <vector>
 
+#include "algorithms/search_algorithm.h"
 #include "evaluation/evaluation_observer.h"
 #include "measures/objective_functions.h"
 #include "parameters/search_space.h"
@@ -28,7 +29,12 @@ class RunReporter final : public EvaluationObserver {
   /// settled, where it is now.
   void settle(const ObjectiveAggregator& aggregator);
 
-  /// The evaluation with the smallest aggregate; of equals the one with the smallest number.
+  /// A search's own best is the run's best from here on: it knows which of equals it took, and its final model run
+  /// only repeats it. Nothing changes where every evaluation of it failed.
+  void takeBestOf(const SearchSummary& search);
+
+  /// The best of the search; without one the evaluation with the smallest aggregate, of equals that with the smallest
+  /// number.
   struct Best {
     int number = 0;
     double aggregate = 0.0;
@@ -53,6 +59,7 @@ class RunReporter final : public EvaluationObserver {
   FailedRunFile& failedRuns_;
   const SearchSpace& space_;
   std::optional<Best> best_;
+  bool isBestOfSearch_ = false;
   std::vector<Unsettled> unsettled_;
   int evaluationCount_ = 0;
   int failedCount_ = 0;

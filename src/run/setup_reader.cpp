@@ -398,6 +398,11 @@ void SetupReader::readSimultaneousSimulations() {
   const SetupSection section = target_.open("SimultaneousSimulations");
   section.read(config_);
   validateProcessCount(config_, section);
+  // A slot has its own copy of the model: ones without work would only fill the disk.
+  const int mostUsed = std::max(1, config_.plannedEvaluations());
+  if (config_.simultaneousSimulations <= mostUsed) return;
+  section.warn("NoSimultaneousSim", fmt::format("only {} can be used by the evaluations of this run", mostUsed));
+  config_.simultaneousSimulations = mostUsed;
 }
 
 void SetupReader::readMeasureFile() {

@@ -71,7 +71,7 @@ class Summary final {
       } else if (parameter.parameterType == ParameterType::dependent) {
         line("  {}: dependent, {}", parameter.name, parameter.equation);
       } else {
-        line("  {}: variable, initial value {}, bounds {} to {}, transformation {}, search from {} to {}",
+        line("  {}: variable, initial value {}, bounds {} to {}, transformation {}, search from {:.6g} to {:.6g}",
              parameter.name, parameter.initialValue, parameter.lowerBound, parameter.upperBound,
              transformationName(parameter.transformationType), space.lower[variable], space.upper[variable]);
         ++variable;

@@ -3,6 +3,7 @@
 #include <fmt/format.h>
 
 #include "common/text.h"
+#include "platform/expression_evaluator.h"
 
 namespace mirevo {
 namespace {
@@ -18,7 +19,7 @@ class EntryCheck final {
   void checkInside(const KdxSection& node, const std::string& pattern) {
     for (const KdxKeyword& keyword : node.keywords()) checkKeyword(node, keyword, pattern);
     for (const auto& section : node.sections()) {
-      std::string name = itemPattern(section->name());
+      const std::string name = itemPattern(section->name());
       const std::string path = pattern.empty() ? name : fmt::format("{}/{}", pattern, name);
       const bool isFirst = node.section(section->name()) == section.get();
       if (findSection(path) == nullptr) {
@@ -80,6 +81,36 @@ void warnAboutUnusedEntries(SetupFile& file) {
   }
   check.checkInside(*target, "");
   check.finish();
+}
+
+std::vector<std::string> unusedParameterWarnings(std::span<const ModelParameter> parameters,
+                                                 std::span<const ParameterTemplate> templates) {
+  std::vector<std::size_t> toFollow;
+  for (const ParameterTemplate& parameterTemplate : templates) {
+    for (const std::size_t index : parameterTemplate.parametersNamed()) toFollow.push_back(index);
+  }
+  std::vector<std::string> names;
+  for (const ModelParameter& parameter : parameters) names.push_back(parameter.name);
+  std::vector<double> values(parameters.size());
+  const ExpressionEvaluator equations(names, values);
+  std::vector<bool> isUsed(parameters.size());
+  while (!toFollow.empty()) {
+    const std::size_t index = toFollow.back();
+    toFollow.pop_back();
+    if (isUsed[index]) continue;
+    isUsed[index] = true;
+    if (parameters[index].parameterType != ParameterType::dependent) continue;
+    const auto equation = equations.compile(parameters[index].equation);
+    toFollow.insert(toFollow.end(), equation->variables().begin(), equation->variables().end());
+  }
+  std::vector<std::string> warnings;
+  for (std::size_t i = 0; i < parameters.size(); ++i) {
+    if (isUsed[i] || parameters[i].parameterType != ParameterType::variable) continue;
+    warnings.push_back(
+        fmt::format("the variable parameter {} stands in no template: its value does not reach the model",
+                    quotedForMessage(parameters[i].name)));
+  }
+  return warnings;
 }
 
 }  // namespace mirevo

@@ -60,6 +60,7 @@ std::string runOptimisation(const TaskContext& context) {
   context.log.line(summary.terminationMessage);
   const std::vector<ParameterSet> best{summary.best};
   if (best.front().empty()) return summary.terminationMessage;
+  if (context.searchEnded) context.searchEnded(summary);
   logBestSet(context, best.front(), summary.bestResult);
   context.log.line("");
   context.log.line("Final model run with the best parameter set:");

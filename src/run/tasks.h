@@ -1,5 +1,6 @@
 #pragma once
 
+#include <functional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -19,6 +20,8 @@ struct TaskContext {
   const SearchSpace& space;
   Evaluator& evaluator;
   RunLog& log;
+  /// Told what a search has found, before the final model run repeats its best set. May be empty.
+  std::function<void(const SearchSummary&)> searchEnded = {};
 };
 
 /// Runs the task that the setup chooses; one that does not exist runs nothing. Returns why it ended, for the result

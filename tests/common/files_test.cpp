@@ -38,6 +38,13 @@ TEST_F(Files, SaysTheSystemsReason) {
   EXPECT_EQ(reason_, "No such file or directory");
   EXPECT_FALSE(readTextFile(folder_.string(), reason_).has_value());
   EXPECT_EQ(reason_, "Is a directory");
+  ASSERT_EQ(::mkfifo(path("pipe").c_str(), 0600), 0);
+  for (const std::string& endless : {path("pipe"), std::string("/dev/zero")}) {
+    EXPECT_FALSE(readTextFile(endless, reason_).has_value());
+    EXPECT_EQ(reason_, "Not a regular file");
+    EXPECT_EQ(faultOfFile(endless), "Not a regular file");
+  }
+  EXPECT_EQ(faultOfFile(path("none.txt")), "No such file or directory");
   EXPECT_FALSE(writeByUnlinkAndCreate(path("none/a.txt"), "x", 0644, reason_));
   EXPECT_EQ(reason_, "No such file or directory");
 }

@@ -35,6 +35,10 @@ TEST(CommandLine, AMissingSetupFileIsNamedOnStandardErrorAndInTheLog) {
   EXPECT_THAT(folder.read("basin.log"), HasSubstr("No such file or directory"));
   EXPECT_FALSE(folder.has("basin.dat"));
 
+  ASSERT_EQ(::mkfifo(folder.file("pipe").c_str(), 0600), 0);
+  EXPECT_EQ(runProgram({folder.file("pipe")}).error,
+            "Error: Unable to open " + folder.file("pipe") + "\nNot a regular file\n");
+
   const ProgramResult nowhere = runProgram({folder.file("no/such/folder/basin.kdx")});
   EXPECT_EQ(nowhere.exitCode, 1);
   EXPECT_THAT(nowhere.error, HasSubstr(folder.file("no/such/folder/basin")));

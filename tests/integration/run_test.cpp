@@ -52,6 +52,23 @@ TEST(Optimisation, ACalibrationEndsWithItsBestSetInLogResultsAndModelFolder) {
   EXPECT_NEAR(number(folder.read("basin_Process1/parameters.txt").substr(4)), number(table.rows.back()[2]), 1e-6);
 }
 
+TEST(Optimisation, OfEqualSetsTheResultsNameTheOneThatTheSearchTookAndUnusedParametersAreWarnedOf) {
+  const ModelFolder folder;
+  folder.write("model/parameters.tpl", "!\na = 4\nc = !c!\n# 1!c!\n");
+  ASSERT_EQ(runProgram({folder.writeSetup({.maxEvaluations = 10})}).exitCode, 0);
+  const ResultTable table = readResults(folder.read("basin_Optimisation.dat"));
+  ASSERT_EQ(table.rows.size(), 12U);
+  EXPECT_THAT(table.comments, Contains("# Best evaluation: 10"));
+  EXPECT_THAT(table.comments, Contains("# Best a = " + table.rows[10][2]));
+  EXPECT_EQ(table.rows[11][2], table.rows[10][2]);
+  const std::string log = folder.read("basin.log");
+  for (const char* name : {"a", "b"}) {
+    EXPECT_THAT(log, HasSubstr(fmt::format("Warning: the variable parameter \"{}\" stands in no template", name)));
+  }
+  EXPECT_THAT(log, Not(HasSubstr("parameter \"c\" stands in no template"))) << "a fixed one";
+  EXPECT_THAT(log, HasSubstr("parameters.tpl:4: the placeholder of parameter \"c\""));
+}
+
 TEST(Optimisation, ClosedStandardOutputsDoNotLetMessagesIntoTheResults) {
   const ModelFolder folder;
   const std::string setup = folder.writeSetup({.option = 0, .modelArguments = "--fail-above 3"});

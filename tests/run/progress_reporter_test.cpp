@@ -91,7 +91,8 @@ TEST_F(ProgressReporterTest, AMessageFileThatCannotBeOpenedIsReportedAndTheRunGo
 }
 
 TEST_F(ProgressReporterTest, TheBaseNameLosesOnlyAKnownEnding) {
-  for (const auto& [file, messages] : {std::pair{"a.log", "a._spi_"}, {"b.inp", "b._spi_"}, {"c.txt", "c.txt._spi_"}}) {
+  for (const auto& [file, messages] :
+       {std::pair{"a.log", "a._spi_"}, {"b.inp", "b._spi_"}, {"c.inp.log", "c.inp._spi_"}, {"d.txt", "d.txt._spi_"}}) {
     ProgressReporter reporter([this] { return now_; });
     reporter.progressInit(folder_.file(file), "");
     EXPECT_TRUE(folder_.has(messages)) << file;

@@ -58,6 +58,23 @@ TEST_F(RunReporterTest, TheBestIsTheFirstOfEqualsAndNeverAFailure) {
   EXPECT_DOUBLE_EQ(reporter_.best()->parameterValues.at(0), 2.0);
 }
 
+TEST_F(RunReporterTest, TheBestOfASearchIsTheOneThatItTook) {
+  finish(1, 5.0);
+  finish(2, 5.0, std::log(2.0));
+  SearchSummary search;
+  search.best = {std::log(2.0)};
+  search.bestResult.number = 2;
+  search.bestResult.aggregate = 5.0;
+  search.bestResult.failure = EvaluationFailure{};
+  reporter_.takeBestOf(search);
+  EXPECT_EQ(reporter_.best()->number, 1) << "a search that found nothing";
+  search.bestResult.failure.reset();
+  reporter_.takeBestOf(search);
+  finish(3, 4.0, std::log(2.0));  // the final model run of a model that does not repeat itself
+  EXPECT_EQ(reporter_.best()->number, 2);
+  EXPECT_DOUBLE_EQ(reporter_.best()->parameterValues.at(0), 2.0);
+}
+
 TEST_F(RunReporterTest, AggregatesUnknownOnArrivalAreFilledInWhenTheTransformationIsSettled) {
   ObjectiveFunction fit;
   fit.name = "fit";

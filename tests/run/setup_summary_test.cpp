@@ -1,6 +1,6 @@
 #include "run/setup_summary.h"
 
-#include <gtest/gtest.h>
+#include <gmock/gmock.h>
 
 #include "run/setup_fixture.h"
 
@@ -14,31 +14,47 @@ TEST_F(SetupSummaryTest, SaysWhatTheRunIsAboutToDo) {
   config.baseFolder = "/base";
   SearchSpace space;
   space.names = {"Depth", "Rate"};
-  space.lower = {4.5, 0.0};
+  space.lower = {4.605170185988092, 0.0};
   space.upper = {6.75, 1.0};
   const int order[] = {1, 3, 2};
-  EXPECT_EQ(setupSummary(config, space, order),
-            "Title: Upper catchment\n"
-            "Task: Parameter optimisation: Population Simplex Evolution with surrogate model\n"
-            "Base folder: /base\n"
-            "Batch items: 1, parameter files: 1, saved output files: 1\n"
-            "Model parameters: 3, of which variable: 2\n"
-            "  Depth: variable, initial value 412.5, bounds 100 to 900, transformation logarithmic, search from 4.5 to "
-            "6.75\n"
-            "  Rate: variable, initial value 0.31, bounds 0 to 1, transformation none, search from 0 to 1\n"
-            "  Sum: dependent, Depth + Rate\n"
-            "  order of evaluation: 1, 3, 2\n"
-            "  constraint: Rate <= Depth\n"
-            "Evaluation period: 2001-01-31 00:00 to 2003-12-31 24:00\n"
-            "Output measures: 2\n"
-            "  Flow error: root mean square, weight 1.25 (above 2.5), objective function Flow\n"
-            "  Written: written by the model, weight 1 (above 1), objective function none\n"
-            "Objective functions: 1\n"
-            "  Flow: sum of squares of 1 output measures, weight 0.75, standard deviation 2.5\n"
-            "Aggregation: No transformation\n"
-            "Random seed: -77\n"
-            "Model evaluations planned: 500\n"
-            "Simultaneous simulations: 4");
+  EXPECT_EQ(
+      setupSummary(config, space, order),
+      "Title: Upper catchment\n"
+      "Task: Parameter optimisation: Population Simplex Evolution with surrogate model\n"
+      "Base folder: /base\n"
+      "Batch items: 1, parameter files: 1, saved output files: 1\n"
+      "Model parameters: 3, of which variable: 2\n"
+      "  Depth: variable, initial value 412.5, bounds 100 to 900, transformation logarithmic, search from 4.60517 "
+      "to 6.75\n"
+      "  Rate: variable, initial value 0.31, bounds 0 to 1, transformation none, search from 0 to 1\n"
+      "  Sum: dependent, Depth + Rate\n"
+      "  order of evaluation: 1, 3, 2\n"
+      "  constraint: Rate <= Depth\n"
+      "Evaluation period: 2001-01-31 00:00 to 2003-12-31 24:00\n"
+      "Output measures: 2\n"
+      "  Flow error: root mean square, weight 1.25 (above 2.5), objective function Flow\n"
+      "  Written: written by the model, weight 1 (above 1), objective function none\n"
+      "Objective functions: 1\n"
+      "  Flow: sum of squares of 1 output measures, weight 0.75, standard deviation 2.5\n"
+      "Aggregation: No transformation\n"
+      "Random seed: -77\n"
+      "Model evaluations planned: 500\n"
+      "Simultaneous simulations: 4");
+}
+
+TEST(TaskName, SaysWhatIsRun) {
+  RunConfig config;
+  const auto name = [&config](SimulationOption option) {
+    config.simulationOption = option;
+    return taskName(config);
+  };
+  EXPECT_EQ(name(SimulationOption::scenarioRuns), "Scenario runs: Single run using initial parameter set");
+  config.scenario.scenarioType = 1;
+  EXPECT_EQ(name(SimulationOption::scenarioRuns), "Scenario runs: Multiple runs");
+  EXPECT_THAT(name(SimulationOption::sensitivityAnalysis),
+              testing::StartsWith("Sensitivity analysis: Local sensitivity analysis"));
+  EXPECT_THAT(name(SimulationOption::uncertaintyAnalysis), testing::StartsWith("Uncertainty analysis"));
+  EXPECT_EQ(name(static_cast<SimulationOption>(4)), "none");
 }
 
 }  // namespace

@@ -1,6 +1,7 @@
 #include "run/tasks.h"
 
 #include <cmath>
+#include <utility>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -135,6 +136,16 @@ TEST_F(TasksTest, AfterEverySearchItsBestSetIsTheFinalModelRun) {
     EXPECT_EQ(last[0].front(), best);
     EXPECT_EQ(evaluations, 91U) << "the budget and the final model run";
   }
+}
+
+TEST_F(TasksTest, DynamicallyDimensionedSearchRunsWithoutTheSurrogateModelThatIsAskedFor) {
+  config_.simulationOption = SimulationOption::parameterOptimisation;
+  config_.optimisation.stopping.maxEvaluations = 20;
+  const std::string plain = run();
+  const auto batches = std::exchange(evaluator_.batches, {});
+  config_.optimisation.useSurrogateModel = 1;
+  EXPECT_EQ(run(), plain);
+  EXPECT_EQ(evaluator_.batches, batches);
 }
 
 /// Fails at a chosen step.
