@@ -51,9 +51,6 @@ std::string runOptimisation(const TaskContext& context) {
   if (!isKnownSearch) return std::string(kEndOfTask);
 
   UniformGenerator random(context.config.randomSeed);
-  if (optimisation.useSurrogateModel != 0 && optimisation.algorithmType == AlgorithmType::dds) {
-    context.log.warning("Dynamically Dimensioned Search runs without the surrogate model");
-  }
   const SearchSummary summary = runConfiguredSearch(optimisation, context.space, context.evaluator, random,
                                                     [&context](std::string_view line) { context.log.line(line); });
   context.log.line("");
