@@ -10,6 +10,7 @@
 
 #include "common/calendar.h"
 #include "common/text.h"
+#include "platform/netcdf_classic.h"
 #include "platform/netcdf_units.h"
 
 namespace mirevo {
@@ -154,6 +155,7 @@ bool NetcdfTimeSeries::open(const std::string& fileName) {
   lastError_.clear();
   fileName_ = fileName;
   if (isSpecialFile(fileName)) return fail("not a regular file");
+  if (const auto cutOff = findCutOff(fileName)) return fail(*cutOff);
   int timeVariable = -1;
   if (succeeded(nc_open(fileName.c_str(), NC_NOWRITE, &file_), "opening") && findTimeVariable(timeVariable) &&
       readTimes(timeVariable) && findItems(timeVariable)) {

@@ -125,17 +125,22 @@ bool isNumber(std::string_view text) {
   return !text.empty() && text.find_first_not_of("0123456789") == std::string_view::npos;
 }
 
-/// Whether the folder is what a run makes and not the model's: a process folder of this or another run, or the saved
-/// output files of this or an earlier run of the same setup.
+/// Whether the folder holds the saved output files of a run, or of an earlier one, of a setup that lies beside it.
+bool isSavedOutput(std::string_view path) {
+  static constexpr std::string_view kMark = "_Saved";
+  const auto mark = path.rfind(kMark);
+  if (mark == std::string_view::npos) return false;
+  const std::string_view rest = path.substr(mark + kMark.size());
+  if (!rest.empty() && !(rest.front() == '.' && isNumber(rest.substr(1)))) return false;
+  struct stat status {};
+  return ::stat(std::string(path.substr(0, mark)).append(".kdx").c_str(), &status) == 0;
+}
+
+/// Whether the folder is what a run makes, this or another, and not the model's.
 bool isMadeByRuns(const std::string& path, std::string_view prefix) {
   if (path.starts_with(prefix) && isNumber(std::string_view(path).substr(prefix.size()))) return true;
+  if (isSavedOutput(path)) return true;
   static constexpr std::string_view kMark = "_Process";
-  static constexpr std::string_view kSaved = "_Saved";
-  if (prefix.ends_with(kMark)) {
-    const std::string saved = std::string(prefix.substr(0, prefix.size() - kMark.size())).append(kSaved);
-    if (path == saved) return true;
-    if (path.starts_with(saved + ".") && isNumber(std::string_view(path).substr(saved.size() + 1))) return true;
-  }
   const auto mark = path.rfind(kMark);
   if (mark == std::string::npos || !isNumber(std::string_view(path).substr(mark + kMark.size()))) return false;
   struct stat status {};

@@ -218,6 +218,42 @@ TEST(NetcdfTimeSeries, FilesThatAreNoneOrCutOffAreRefused) {
   std::remove(path.c_str());
 }
 
+// The library reads zeros beyond the end of a classic file: a run that stopped half-way would count as a good one.
+TEST(NetcdfTimeSeries, AClassicFileThatWasNotWrittenToItsEndIsRefused) {
+  for (const int format : {0, NC_64BIT_OFFSET, NC_64BIT_DATA}) {
+    for (const std::size_t timeLength : {std::size_t{3}, std::size_t{NC_UNLIMITED}}) {
+      for (const bool hasTwo : {false, true}) {
+        NetcdfFile file("classic.nc", format);
+        const int time = file.dimension("time", timeLength);
+        const int axis = file.time(time, "days since 1990-01-01");
+        std::vector<int> variables{axis};
+        if (hasTwo) variables.push_back(file.variable("level", NC_SHORT, {time}));
+        variables.push_back(file.variable("flow", NC_DOUBLE, {time, file.dimension("station", 2)}));
+        file.number(variables.back(), "scale_factor", NC_DOUBLE, 1.0);
+        nc_enddef(file.id());
+        const std::size_t start[] = {0, 0};
+        const std::size_t count[] = {3, 2};
+        const double values[] = {1, 2, 3, 4, 5, 6};
+        for (const int variable : variables) {
+          ASSERT_EQ(nc_put_vara_double(file.id(), variable, start, count, values), NC_NOERR);
+        }
+        file.close();
+        const auto size = std::filesystem::file_size(file.path());
+        NetcdfTimeSeries series;
+        ASSERT_TRUE(series.open(file.path())) << series.lastError();
+        EXPECT_EQ(series.itemCount(), hasTwo ? 3 : 2);
+        for (const std::size_t left : {size - 1, size - 8, size - 40}) {
+          std::filesystem::resize_file(file.path(), left);
+          EXPECT_FALSE(series.open(file.path())) << format << " " << timeLength << " " << left;
+          EXPECT_EQ(series.lastError(), file.path() + ": expected " + std::to_string(size) +
+                                            " bytes as its header says, found " + std::to_string(left) +
+                                            ": it was not written to its end");
+        }
+      }
+    }
+  }
+}
+
 TEST(NetcdfUnits, OriginsAndCalendars) {
   struct Case {
     const char* units;

@@ -95,9 +95,11 @@ TEST(ProcessFolder, NeverCopiesWhatRunsMake) {
   folder.write("other_Process1/" + std::string(kBatchLogName), "log");  // of another setup's run
   folder.write("my_Process1/data.txt", "mine");                         // somebody's own: no batch log
   folder.write("cal_Processes/data.txt", "mine");
+  folder.write("cal.kdx", "");
   folder.write("cal_Saved/1/out.csv", "");
   folder.write("cal_Saved.12/1/out.csv", "");
   folder.write("cal_Saved.old/data.txt", "mine");
+  folder.write("my_Saved/data.txt", "mine");  // no setup of that name
   for (int round = 0; round < 2; ++round)
     makeProcessFolder(folder.path(), folder / "cal_Process1", folder / "cal_Process");
 
@@ -108,6 +110,7 @@ TEST(ProcessFolder, NeverCopiesWhatRunsMake) {
   EXPECT_FALSE(folder.exists("cal_Process1/cal_Saved"));
   EXPECT_FALSE(folder.exists("cal_Process1/cal_Saved.12"));
   EXPECT_TRUE(folder.exists("cal_Process1/cal_Saved.old/data.txt"));
+  EXPECT_TRUE(folder.exists("cal_Process1/my_Saved/data.txt"));
   EXPECT_TRUE(folder.exists("cal_Process1/my_Process1/data.txt"));
   EXPECT_TRUE(folder.exists("cal_Process1/cal_Processes/data.txt"));
 }
