@@ -41,11 +41,6 @@ std::optional<char> findSeparator(std::string_view header) {
 }  // namespace
 
 bool CsvTimeSeries::open(const std::string& fileName) {
-  if (isSpecialFile(fileName)) {
-    clear();
-    lastError_ = fileName + ": not a regular file";
-    return false;
-  }
   std::string reason;
   std::optional<std::string> content = readTextFile(fileName, reason);
   if (!content) {

@@ -9,6 +9,7 @@
 #include <netcdf.h>
 
 #include "common/calendar.h"
+#include "common/files.h"
 #include "common/text.h"
 #include "platform/netcdf_classic.h"
 #include "platform/netcdf_units.h"
@@ -154,7 +155,7 @@ bool NetcdfTimeSeries::open(const std::string& fileName) {
   close();
   lastError_.clear();
   fileName_ = fileName;
-  if (isSpecialFile(fileName)) return fail("not a regular file");
+  if (const std::string fault = faultOfFile(fileName); !fault.empty()) return fail("opening: " + fault);
   if (const auto cutOff = findCutOff(fileName)) return fail(*cutOff);
   int timeVariable = -1;
   if (succeeded(nc_open(fileName.c_str(), NC_NOWRITE, &file_), "opening") && findTimeVariable(timeVariable) &&

@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <filesystem>
-#include <system_error>
 
 #include "common/text.h"
 #include "platform/csv_time_series.h"
@@ -52,12 +51,6 @@ std::optional<float> extractValue(const TimeSeriesObject& series, int item, doub
 }
 
 }  // namespace
-
-bool isSpecialFile(const std::string& fileName) {
-  std::error_code ignored;  // the reader itself says why a file cannot be read
-  const std::filesystem::file_status status = std::filesystem::status(fileName, ignored);
-  return std::filesystem::is_other(status);
-}
 
 std::unique_ptr<TimeSeriesObject> createTimeSeriesObject(const std::string& fileName, std::string& reason) {
   const std::string ending = toLowerAscii(std::filesystem::path(trimTrailing(fileName)).extension().string());

@@ -40,10 +40,6 @@ class TimeSeriesObject {
   virtual std::span<const float> values(int item) const = 0;
 };
 
-/// Whether a name is that of something that is neither a file nor a folder: a pipe or device, which would be waited for
-/// or never end.
-bool isSpecialFile(const std::string& fileName);
-
 /// An object of the kind that the file name's ending asks for; nullptr when no kind reads such files. `reason` then
 /// names the known endings.
 std::unique_ptr<TimeSeriesObject> createTimeSeriesObject(const std::string& fileName, std::string& reason);

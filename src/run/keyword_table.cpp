@@ -350,7 +350,8 @@ const std::vector<KeywordRow>& rows() {
       {kUncertain, "Standard_Deviation", Type::real, "", kPositive, "search scale", "Standard deviation.",
        MIREVO_FIELD(c.uncertainty.parameters[i].standardDeviation)},
       {kSlots, "NoSimultaneousSim", Type::integer, "1", from(1), "model runs",
-       "Model runs at once, each in a process folder of its own. In an optimisation more than 1 needs PSE.",
+       "Model runs at once, each in a process folder of its own; no more than the run has evaluations. In an "
+       "optimisation more than 1 needs PSE.",
        MIREVO_FIELD(c.simultaneousSimulations)},
       {kSlots, "UseSingleThread", Type::integer, "0", kAny, "", "1: tells each model run to use one thread.",
        MIREVO_FIELD(c.useSingleThread)},

@@ -173,7 +173,7 @@ TEST(CsvTimeSeries, OpenSaysWhyAFileCannotBeRead) {
   EXPECT_FALSE(series.open(::testing::TempDir()));
   EXPECT_THAT(series.lastError(), ::testing::EndsWith("Is a directory"));
   EXPECT_FALSE(series.open("/dev/zero"));
-  EXPECT_EQ(series.lastError(), "/dev/zero: not a regular file");
+  EXPECT_EQ(series.lastError(), "/dev/zero: Not a regular file");
   // The same object reads another file after a failure, with nothing left of the one before.
   const std::string path = ::testing::TempDir() + "/reopened.csv";
   std::ofstream(path) << "time,Q\n2001-01-01,7\n";
