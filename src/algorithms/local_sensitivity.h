@@ -6,18 +6,13 @@
 #include <string>
 #include <vector>
 
+#include "algorithms/analysis_settings.h"
 #include "algorithms/covariance.h"
 #include "algorithms/uncertainty.h"
 #include "evaluation/evaluator.h"
 #include "parameters/search_space.h"
 
 namespace mirevo {
-
-struct SensitivitySettings {
-  std::int32_t differencing = 0;        ///< 0 forward, 1 central
-  std::int32_t perturbationOption = 0;  ///< fraction of 0 the parameter's range, 1 its value
-  double perturbationFraction = 0.01;
-};
 
 /// The two sets whose difference gives the derivatives by one parameter.
 struct ParameterDifference {

@@ -5,24 +5,13 @@
 #include <string>
 #include <vector>
 
+#include "algorithms/analysis_settings.h"
 #include "algorithms/sample_summary.h"
 #include "algorithms/special_functions.h"
 #include "common/parameter_set.h"
 #include "evaluation/evaluator.h"
 
 namespace mirevo {
-
-/// The distribution of one variable parameter, on the search scale: of a logarithmic parameter that of its logarithm.
-struct NormalDistribution {
-  double mean = 0.0;
-  double standardDeviation = 0.0;
-};
-
-struct UncertaintySettings {
-  std::int32_t uncertaintyType = 0;            ///< 0 simple random, 1 Latin hypercube sampling
-  std::int32_t sampleSize = 0;                 ///< N, at least 2
-  std::vector<NormalDistribution> parameters;  ///< one a variable parameter, in setup order
-};
 
 /// N sets drawn from independent normal distributions, not held against the bounds. The stream starts anew from the
 /// seed, whose sign does not matter. A deviate that has no quantile is reported to `messages` and yields the mean.

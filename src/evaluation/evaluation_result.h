@@ -34,6 +34,9 @@ struct EvaluationResult {
   std::vector<double> measureValues;    ///< one an output measure
   std::vector<double> objectiveValues;  ///< one an objective function
   double aggregate = kFailedRunValue;   ///< what the searches minimise
+  /// Where the task asks for them: the simulated values at the observation times of ModelRunner::observedSeries(), one
+  /// series after another, NaN where the model has none. Empty for a failed evaluation.
+  std::vector<double> simulatedValues;
   std::optional<EvaluationFailure> failure;
   std::vector<std::string> warnings;  ///< what the log should say of the run, one line each
 

@@ -83,6 +83,11 @@ ModelRunner::ModelRunner(ModelDescription description, ParameterModel& parameter
   const std::vector<std::string> converted = readTemplates();
   series_ = SeriesTables::MirevoTSobjectInit(description_.measures, description_.period);
   savedFiles_ = SavedFiles(description_.savedFiles, description_.baseFolder, description_.savedFolder);
+  for (std::size_t i = 0; i < description_.measures.size() && description_.keepSimulatedValues; ++i) {
+    const OutputMeasure& measure = description_.measures[i];
+    if (measure.interfaceType != InterfaceType::timeSeries) continue;
+    observedSeries_.push_back(readObservedSeries(i, measure, description_.period, series_.observation(i)));
+  }
   if (!launcher_.initialise(launcherSettings)) {
     fatalError("Error: Unable to initialise MirevoSimpleLaunch", launcher_.lastError());
   }
@@ -266,6 +271,11 @@ std::optional<EvaluationFailure> ModelRunner::readMeasures(int slot, EvaluationR
           Kind::resultsNotReadable,
           fmt::format("{}: expected at least {} numbers, found {}", files.measureFile, number, written.size()), slot);
     }
+  }
+  for (const ObservedSeries& observed : observedSeries_) {
+    if (failure) break;
+    appendSimulatedValues(observed, description_.measures[observed.measure], series_.simulation(observed.measure),
+                          result.simulatedValues);
   }
   series_.releaseSimulationFiles();
   return failure;

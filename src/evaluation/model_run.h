@@ -9,6 +9,7 @@
 #include "evaluation/saved_files.h"
 #include "measures/measure_statistics.h"
 #include "measures/objective_functions.h"
+#include "measures/observed_series.h"
 #include "measures/output_measure.h"
 #include "measures/series_tables.h"
 #include "parameters/parameter_model.h"
@@ -28,6 +29,7 @@ struct ModelDescription {
   std::vector<ObjectiveFunction> objectives;
   std::vector<std::string> savedFiles;  ///< kept of every model run
   std::string savedFolder;              ///< where they are kept
+  bool keepSimulatedValues = false;  ///< results hold the simulated values at the observation times
 };
 
 /// Model runs in slots: writes the input, starts the batch, and turns what it wrote into a result. Used by the local
@@ -56,6 +58,8 @@ class ModelRunner final {
 
   ObjectiveAggregator& aggregator() { return aggregator_; }
   ProcessLauncher& launcher() { return launcher_; }
+  /// The observations of every measure of interface type 0; empty unless simulated values are kept.
+  const std::vector<ObservedSeries>& observedSeries() const { return observedSeries_; }
   const std::vector<ParameterTemplate>& templates() const { return templates_; }
 
  private:
@@ -73,7 +77,7 @@ class ModelRunner final {
   void updateResistanceNumbers(const std::string& path);
   std::optional<EvaluationFailure> findBatchFailure(int slot) const;
   std::optional<EvaluationFailure> findMissingResults(int slot) const;
-  /// Fills in the measure values, unless what the model wrote cannot be used.
+  /// Fills in the measure and simulated values, unless what the model wrote cannot be used.
   std::optional<EvaluationFailure> readMeasures(int slot, EvaluationResult& result);
   std::optional<EvaluationFailure> readSeriesMeasure(int slot, std::size_t measure, EvaluationResult& result);
   /// A warning when a run meets fewer observations than any before it: the rest of them is not judged.
@@ -87,6 +91,7 @@ class ModelRunner final {
   std::vector<ParameterTemplate> templates_;  ///< one a parameter file
   SeriesTables series_;
   SavedFiles savedFiles_;
+  std::vector<ObservedSeries> observedSeries_;
   std::vector<SlotFiles> slots_;
   std::vector<std::optional<std::size_t>> fewestPairs_;  ///< one a measure: least that a warning was given for
 };

@@ -25,7 +25,7 @@ std::string commentLines(std::string_view text) {
 
 std::string commentLines(std::span<const std::string> texts) {
   std::string lines;
-  for (const std::string& text : texts) lines += commentLines(text);
+  for (const std::string& text : texts) lines += text.empty() ? "#\n" : commentLines(text);
   return lines;
 }
 

@@ -19,7 +19,7 @@ int RunConfig::plannedEvaluations() const {
     case SimulationOption::scenarioRuns:
       return scenario.runCount;
     case SimulationOption::sensitivityAnalysis: {
-      const int perParameter = sensitivity.differencing == 1 ? 2 : 1;
+      const int perParameter = sensitivity.local.differencing == 1 ? 2 : 1;
       return 1 + perParameter * static_cast<int>(variableParameterCount());
     }
     case SimulationOption::parameterOptimisation:

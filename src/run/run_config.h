@@ -4,6 +4,7 @@
 #include <string>
 #include <vector>
 
+#include "algorithms/analysis_settings.h"
 #include "algorithms/search_settings.h"
 #include "measures/objective_functions.h"
 #include "measures/output_measure.h"
@@ -29,9 +30,7 @@ struct ScenarioConfig {
 
 struct SensitivityConfig {
   std::int32_t sensitivityType = 0;
-  std::int32_t differencing = 0;        ///< 0 forward, 1 central
-  std::int32_t perturbationOption = 0;  ///< fraction of 0 the parameter's range, 1 its value
-  double perturbationFraction = 0.01;
+  SensitivitySettings local;
   bool calculateCovarianceMatrix = false;
 };
 
@@ -45,17 +44,6 @@ struct OptimisationConfig {
   SurrogateSettings surrogate;
   StoppingCriteria stopping;
   InitialSampleSettings initialSample;
-};
-
-struct UncertaintyParameter {
-  double mean = 0.0;               ///< search scale
-  double standardDeviation = 0.0;  ///< search scale
-};
-
-struct UncertaintyConfig {
-  std::int32_t uncertaintyType = 0;  ///< 0 simple random, 1 Latin hypercube sampling
-  std::int32_t sampleSize = 0;
-  std::vector<UncertaintyParameter> parameters;  ///< one a variable parameter
 };
 
 /// All settings of a run. File names are absolute. Composed of the settings that each part defines for itself; no part
@@ -82,7 +70,7 @@ struct RunConfig {
   ScenarioConfig scenario;
   SensitivityConfig sensitivity;
   OptimisationConfig optimisation;
-  UncertaintyConfig uncertainty;
+  UncertaintySettings uncertainty;
   std::int32_t randomSeed = 1;  ///< of the initial sample and of the uncertainty analysis: one setting
 
   std::int32_t simultaneousSimulations = 1;

@@ -41,6 +41,7 @@ ModelDescription describeModel(const RunConfig& config, const std::string& fileP
   model.objectives = config.objectives;
   model.savedFiles = config.savedOutputFiles;
   model.savedFolder = filePrefix + "_Saved";
+  model.keepSimulatedValues = keepsSimulatedValues(config);
   return model;
 }
 
@@ -74,7 +75,8 @@ int RunDriver::run(const std::string& setupFileName) {
     state_.progress.writeStatus(taskName(config_));
     state_.progress.progressEvaluationLabel(config_.plannedEvaluations());
     finish(runTask({config_, parameters_->searchSpace(), *evaluator_, state_.log,
-                    [this](const SearchSummary& summary) { reporter_->takeBestOf(summary); }}));
+                    [this](const SearchSummary& summary) { reporter_->takeBestOf(summary); }, filePrefix_,
+                    runner_->observedSeries()}));
     return 0;
   } catch (const FatalError& error) {
     return endInError(error.message(), error.detail());
@@ -186,14 +188,17 @@ std::vector<std::string> RunDriver::closingLines(std::string_view terminationMes
   return lines;
 }
 
-bool RunDriver::closeResults(std::string_view terminationMessage, std::string& reason) {
+bool RunDriver::closeResults(std::string_view terminationMessage, std::string& reason,
+                             std::span<const std::string> report) {
   if (reporter_) reporter_->settle(*aggregator_);
-  return results_.finish(closingLines(terminationMessage), reason);
+  std::vector<std::string> lines = closingLines(terminationMessage);
+  lines.insert(lines.end(), report.begin(), report.end());
+  return results_.finish(lines, reason);
 }
 
-void RunDriver::finish(std::string_view terminationMessage) {
+void RunDriver::finish(const TaskOutcome& outcome) {
   std::string reason;
-  if (!closeResults(terminationMessage, reason)) {
+  if (!closeResults(outcome.terminationMessage, reason, outcome.report)) {
     fatalError("Error: Unable to write to " + results_.path(), reason);
   }
   state_.log.line("");

@@ -2,6 +2,7 @@
 
 #include <memory>
 #include <optional>
+#include <span>
 #include <string>
 #include <string_view>
 
@@ -17,6 +18,7 @@
 #include "run/run_lock.h"
 #include "run/run_reporter.h"
 #include "run/run_state.h"
+#include "run/tasks.h"
 
 namespace mirevo {
 
@@ -38,9 +40,10 @@ class RunDriver final {
   void logSetup();
   void openResults();
   void openResultFile();
-  /// False, with the system's reason, when the results could not be brought to their end.
-  bool closeResults(std::string_view terminationMessage, std::string& reason);
-  void finish(std::string_view terminationMessage);
+  /// False, with the system's reason, when the results could not be brought to their end. `report`: what the task
+  /// found.
+  bool closeResults(std::string_view terminationMessage, std::string& reason, std::span<const std::string> report = {});
+  void finish(const TaskOutcome& outcome);
   int endInError(std::string_view message, std::string_view detail);
   int endCancelled();
   /// Log closed, model processes halted, progress ended.

@@ -129,7 +129,7 @@ std::string taskName(const RunConfig& config) {
                                                : "Scenario runs: Multiple runs";
     case SimulationOption::sensitivityAnalysis:
       return fmt::format("Sensitivity analysis: Local sensitivity analysis, {} differences",
-                         config.sensitivity.differencing == 1 ? "central" : "forward");
+                         config.sensitivity.local.differencing == 1 ? "central" : "forward");
     case SimulationOption::parameterOptimisation:
       break;
     case SimulationOption::uncertaintyAnalysis:

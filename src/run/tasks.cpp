@@ -2,10 +2,10 @@
 
 #include <fmt/format.h>
 
-#include "algorithms/uncertainty.h"
 #include "algorithms/uniform_generator.h"
 #include "common/fatal_error.h"
 #include "common/text.h"
+#include "run/analysis_tasks.h"
 #include "run/search_factory.h"
 
 namespace mirevo {
@@ -65,43 +65,27 @@ std::string runOptimisation(const TaskContext& context) {
   return summary.terminationMessage;
 }
 
-std::string runSensitivity(const TaskContext& context) {
-  if (context.config.sensitivity.sensitivityType == 0) {
-    fatalError("Error: Local sensitivity analysis is not available in this version");
-  }
-  return std::string(kEndOfTask);
-}
-
-std::string runUncertainty(const TaskContext& context) {
-  const UncertaintyConfig& config = context.config.uncertainty;
-  UncertaintySettings settings{config.uncertaintyType, config.sampleSize, {}};
-  for (const UncertaintyParameter& parameter : config.parameters) {
-    settings.parameters.push_back({parameter.mean, parameter.standardDeviation});
-  }
-  const UncertaintyOutcome outcome =
-      uncertaintyAnalysis(settings, context.config.randomSeed, context.evaluator,
-                          [&context](std::string_view text) { context.log.warning(text); });
-  AnalysisNames names{context.space.names, {}, objectiveNames(context.config)};
-  for (const OutputMeasure& measure : context.config.measures) names.measures.push_back(measure.name);
-  context.log.line("");
-  for (const std::string& line : formatUncertainty(summariseUncertainty(outcome), names)) context.log.line(line);
-  return std::string(kEndOfTask);
-}
-
 }  // namespace
 
-std::string runTask(const TaskContext& context) {
+TaskOutcome runTask(const TaskContext& context) {
   switch (context.config.simulationOption) {
     case SimulationOption::scenarioRuns:
-      return runScenarios(context);
+      return {runScenarios(context), {}};
     case SimulationOption::sensitivityAnalysis:
-      return runSensitivity(context);
+      if (context.config.sensitivity.sensitivityType != 0) break;
+      return {std::string(kEndOfTask), runSensitivity(context)};
     case SimulationOption::parameterOptimisation:
-      return runOptimisation(context);
+      return {runOptimisation(context), {}};
     case SimulationOption::uncertaintyAnalysis:
-      return runUncertainty(context);
+      return {std::string(kEndOfTask), runUncertainty(context)};
   }
-  return std::string(kEndOfTask);
+  return {std::string(kEndOfTask), {}};
+}
+
+bool keepsSimulatedValues(const RunConfig& config) {
+  return config.simulationOption == SimulationOption::uncertaintyAnalysis ||
+         (config.simulationOption == SimulationOption::sensitivityAnalysis &&
+          config.sensitivity.calculateCovarianceMatrix);
 }
 
 std::string_view resultFileEnding(const RunConfig& config) {

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <functional>
+#include <span>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -8,6 +9,7 @@
 #include "algorithms/search_algorithm.h"
 #include "common/parameter_set.h"
 #include "evaluation/evaluator.h"
+#include "measures/observed_series.h"
 #include "parameters/search_space.h"
 #include "run/run_config.h"
 #include "run/run_log.h"
@@ -22,11 +24,22 @@ struct TaskContext {
   RunLog& log;
   /// Told what a search has found, before the final model run repeats its best set. May be empty.
   std::function<void(const SearchSummary&)> searchEnded = {};
+  std::string filePrefix = {};  ///< folder and name of the setup: files beside the result file begin with it
+  /// The observations whose simulated values the results hold; needed where keepsSimulatedValues().
+  std::span<const ObservedSeries> observedSeries = {};
 };
 
-/// Runs the task that the setup chooses; one that does not exist runs nothing. Returns why it ended, for the result
-/// file. Throws FatalError and RunCancelled.
-std::string runTask(const TaskContext& context);
+/// How a task ended.
+struct TaskOutcome {
+  std::string terminationMessage;
+  std::vector<std::string> report;  ///< what it found, for the end of the result file; the log has it already
+};
+
+/// Runs the task that the setup chooses; one that does not exist runs nothing. Throws FatalError and RunCancelled.
+TaskOutcome runTask(const TaskContext& context);
+
+/// Whether the task works with simulated values at the observation times, which the results then have to hold.
+bool keepsSimulatedValues(const RunConfig& config);
 
 /// The ending of the task's result file, behind the setup's name; empty for a task without one.
 std::string_view resultFileEnding(const RunConfig& config);

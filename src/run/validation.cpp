@@ -32,12 +32,12 @@ void validateDate(const DateRecord& date, std::string_view keyword, const SetupS
 }  // namespace
 
 void validateParameterBounds(const ModelParameter& parameter, const SetupSection& section) {
-  if (isVariable(parameter) && parameter.initialValue < parameter.lowerBound) {
+  if (parameter.initialValue < parameter.lowerBound) {
     section.refuse("Error: Initial parameter value smaller than lower bound for parameter " + parameter.name,
                    "Initial_Value",
                    fmt::format("expected {} or more, found {}", parameter.lowerBound, parameter.initialValue));
   }
-  if (isVariable(parameter) && parameter.initialValue > parameter.upperBound) {
+  if (parameter.initialValue > parameter.upperBound) {
     section.refuse("Error: Initial parameter value larger than upper bound for parameter " + parameter.name,
                    "Initial_Value",
                    fmt::format("expected {} or less, found {}", parameter.upperBound, parameter.initialValue));
@@ -157,17 +157,17 @@ void validateSensitivityType(const SensitivityConfig& sensitivity, const SetupSe
 
 void validateLocalSensitivity(const SensitivityConfig& sensitivity, std::span<const ModelParameter> parameters,
                               const SetupSection& section) {
-  section.check("Differencing", sensitivity.differencing,
+  section.check("Differencing", sensitivity.local.differencing,
                 "Error: Differencing option in local sensitivity analysis invalid");
-  section.check("Perturbation_Option", sensitivity.perturbationOption,
+  section.check("Perturbation_Option", sensitivity.local.perturbationOption,
                 "Error: Perturbation option in local sensitivity analysis invalid");
-  section.check("Perturbation_Fraction", sensitivity.perturbationFraction,
+  section.check("Perturbation_Fraction", sensitivity.local.perturbationFraction,
                 "Error: Perturbation fraction in local sensitivity analysis invalid");
   for (const ModelParameter& parameter : parameters) {
     if (!isVariable(parameter)) continue;
-    const double base = sensitivity.perturbationOption == 0 ? parameter.upperBound - parameter.lowerBound
-                                                            : std::abs(parameter.initialValue);
-    const double step = sensitivity.perturbationFraction * base;
+    const double base = sensitivity.local.perturbationOption == 0 ? parameter.upperBound - parameter.lowerBound
+                                                                  : std::abs(parameter.initialValue);
+    const double step = sensitivity.local.perturbationFraction * base;
     // A perturbation that would leave the range is taken the other way, so that both must fail.
     if (parameter.initialValue + step <= parameter.upperBound || parameter.initialValue - step >= parameter.lowerBound)
       continue;
@@ -274,13 +274,13 @@ void validateInitialSampleMethod(const InitialSampleSettings& sample, const Setu
   if (sample.generation == kFromFile) validateFileOpens(sample.fileName, "Initial_Sample_File_Name", section);
 }
 
-void validateUncertaintyType(const UncertaintyConfig& uncertainty, const SetupSection& section) {
+void validateUncertaintyType(const UncertaintySettings& uncertainty, const SetupSection& section) {
   section.check("Uncertainty_Type", uncertainty.uncertaintyType,
                 "Error: Invalid uncertainty estimation type selection");
   section.check("Sample_Size", uncertainty.sampleSize, "Error: Sample size in uncertainty estimation invalid");
 }
 
-void validateUncertaintyDeviation(const UncertaintyParameter& parameter, const SetupSection& section) {
+void validateUncertaintyDeviation(const NormalDistribution& parameter, const SetupSection& section) {
   section.check("Standard_Deviation", parameter.standardDeviation,
                 "Error: Standard deviation in uncertainty estimation invalid");
 }

@@ -52,8 +52,8 @@ void validateSurrogateControl(const OptimisationConfig& optimisation, std::size_
 void validateStoppingCriteria(const StoppingCriteria& stopping, const SetupSection& section);
 void validateInitialSampleMethod(const InitialSampleSettings& sample, const SetupSection& section);
 
-void validateUncertaintyType(const UncertaintyConfig& uncertainty, const SetupSection& section);
-void validateUncertaintyDeviation(const UncertaintyParameter& parameter, const SetupSection& section);
+void validateUncertaintyType(const UncertaintySettings& uncertainty, const SetupSection& section);
+void validateUncertaintyDeviation(const NormalDistribution& parameter, const SetupSection& section);
 
 void validateProcessCount(const RunConfig& config, const SetupSection& section);
 

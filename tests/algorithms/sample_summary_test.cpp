@@ -42,26 +42,23 @@ TEST(SampleCorrelation, MatchesAWorkedExampleAndRefusesConstants) {
   EXPECT_EQ(matrix[2][2], 1.0);
 }
 
-TEST(SeriesBand, HasTheQuantilesOfAllValuesWhateverTheirOrder) {
-  UniformGenerator random(3);
-  for (const std::size_t n : {1, 2, 19, 21, 22, 200, 401}) {
-    std::vector<double> values;
-    SeriesBand band({0.5, kNaN, -1.0, 0.5}, 401);
-    for (std::size_t i = 0; i < n; ++i) {
-      values.push_back(random.next());
-      band.add(std::vector<double>{values.back(), values.back(), values.back(), kNaN});
-    }
-    const SeriesBand::Bounds bounds = band.bounds();
-    std::sort(values.begin(), values.end());
-    EXPECT_NEAR(bounds.lower[0], sortedQuantile(values, 0.05), 1e-15) << n;
-    EXPECT_NEAR(bounds.upper[0], sortedQuantile(values, 0.95), 1e-15) << n;
-    EXPECT_TRUE(std::isnan(bounds.lower[3]));
-    EXPECT_EQ(bounds.observationCount, 2U);
-    if (n >= 19) {
-      EXPECT_EQ(bounds.shareInside, 0.5);
-    }
+TEST(SeriesBand, HasTheQuantilesOfWhatSucceededAndCountsTheObservationsInside) {
+  std::vector<EvaluationResult> results(102);
+  for (std::size_t i = 0; i < results.size(); ++i) {
+    if (i == 7) continue;                                                          // failed
+    const double value = static_cast<double>((37 * (i - (i > 7 ? 1 : 0))) % 101);  // 0 to 100, shuffled
+    results[i].simulatedValues = {-1.0, value, value, i == 0 ? kNaN : value, kNaN, -value};
   }
-  EXPECT_TRUE(std::isnan(SeriesBand({1.0}, 5).bounds().shareInside));
+  const SeriesBand band = seriesBand(std::vector{5.0, 4.9, 50.0, 1.0, -95.0}, results, 1);
+  EXPECT_DOUBLE_EQ(band.lower[0], 5.0);
+  EXPECT_DOUBLE_EQ(band.median[0], 50.0);
+  EXPECT_DOUBLE_EQ(band.upper[0], 95.0);
+  EXPECT_DOUBLE_EQ(band.lower[2], 1.0 + 99.0 * 0.05);  // 1 to 100
+  EXPECT_TRUE(std::isnan(band.lower[3]) && std::isnan(band.median[3]) && std::isnan(band.upper[3]));
+  EXPECT_DOUBLE_EQ(band.lower[4], -95.0);
+  EXPECT_EQ(band.observationCount, 4U);
+  EXPECT_EQ(band.shareInside, 0.75);
+  EXPECT_TRUE(std::isnan(seriesBand(std::vector{1.0}, {}, 0).shareInside));
 }
 
 }  // namespace

@@ -162,7 +162,16 @@ class ModelFolder : public TemporaryFolder {
                         settings.simulationFile, settings.observationFile);
     text += savedText(settings);
     text += scenarioText(settings);
-    text += fmt::format(R"(  [OPTIMISATION_ALGORITHM]
+    text += fmt::format(R"(  [SENSITIVITY_ANALYSIS]
+    Sensitivity_Type = 0
+    [LOCAL_SA]
+      Differencing = 1
+      Perturbation_Option = 1
+      Perturbation_Fraction = 0.005
+      Calculate_Covmatrix = 1
+    [/LOCAL_SA]
+  [/SENSITIVITY_ANALYSIS]
+  [OPTIMISATION_ALGORITHM]
     Algorithm_Type = 2
     Use_Surrogate_Model = 0
     [DDS_CONTROL_PARAMETERS]

@@ -53,7 +53,7 @@ class TasksTest : public ::testing::Test {
     config_.objectives.resize(1);
     space_ = BuildSearchSpace(config_.parameters);
   }
-  std::string run() { return runTask({config_, space_, evaluator_, log_}); }
+  std::string run() { return runTask({config_, space_, evaluator_, log_}).terminationMessage; }
 
   RunConfig config_;
   SearchSpace space_;

@@ -1,0 +1,45 @@
+#include "measures/observed_series.h"
+
+#include <limits>
+#include <optional>
+#include <span>
+
+#include "measures/dates.h"
+#include "measures/measure_statistics.h"
+
+namespace mirevo {
+
+ObservedSeries readObservedSeries(std::size_t index, const OutputMeasure& measure, const EvaluationPeriod& period,
+                                  TimeSeriesObject& observation) {
+  ObservedSeries observed;
+  observed.measure = index;
+  requireItem(observation, measure.observation);
+  const std::optional<DateRecord> start = observation.startTime();
+  if (!start) return observed;
+  observed.start = *start;
+  const double first = daysSince(*start, period.start) - kSameTimeDays;
+  const double last = daysSince(*start, period.end) + kSameTimeDays;
+  const std::span<const double> times = observation.times();
+  const std::span<const float> values = observation.values(measure.observation.itemNo);
+  for (std::size_t k = 0; k < times.size(); ++k) {
+    if (times[k] < first || times[k] > last || isMissing(values[k], observation.deleteValue())) continue;
+    observed.days.push_back(times[k]);
+    observed.values.push_back(values[k]);
+  }
+  return observed;
+}
+
+void appendSimulatedValues(const ObservedSeries& observed, const OutputMeasure& measure, TimeSeriesObject& simulation,
+                           std::vector<double>& values) {
+  requireItem(simulation, measure.simulation);
+  const std::optional<DateRecord> start = simulation.startTime();
+  const double offset = start ? daysSince(*start, observed.start) : 0.0;
+  std::size_t hint = 0;
+  for (const double days : observed.days) {
+    std::optional<float> value;
+    if (start) value = valueAt(simulation, measure.simulation.itemNo, days + offset, hint);
+    values.push_back(value ? *value : std::numeric_limits<double>::quiet_NaN());
+  }
+}
+
+}  // namespace mirevo

@@ -1,0 +1,29 @@
+#pragma once
+
+#include <cstddef>
+#include <vector>
+
+#include "common/date_record.h"
+#include "measures/output_measure.h"
+#include "platform/time_series_object.h"
+
+namespace mirevo {
+
+/// The observations of one output measure: those in the evaluation period that are not missing. They stay the same for
+/// the whole run, so that simulated values at their times can be compared from one evaluation to the next.
+struct ObservedSeries {
+  std::size_t measure = 0;     ///< 0-based index of the output measure
+  DateRecord start{};          ///< origin of `days`
+  std::vector<double> days;    ///< ascending
+  std::vector<double> values;  ///< one a time
+};
+
+/// Both ends of the period belong to it. Throws FatalError where the item cannot be read.
+ObservedSeries readObservedSeries(std::size_t index, const OutputMeasure& measure, const EvaluationPeriod& period,
+                                  TimeSeriesObject& observation);
+
+/// Appends the simulated value at each observation time, NaN where there is none.
+void appendSimulatedValues(const ObservedSeries& observed, const OutputMeasure& measure, TimeSeriesObject& simulation,
+                           std::vector<double>& values);
+
+}  // namespace mirevo

@@ -1,0 +1,195 @@
+#include <algorithm>
+#include <cmath>
+#include <cstdlib>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "integration/model_folder.h"
+
+namespace mirevo::testing {
+namespace {
+
+using ::testing::Contains;
+using ::testing::HasSubstr;
+using ::testing::Not;
+using ::testing::StartsWith;
+
+/// The numbers of a report's row: those behind `name` in the first comment that begins with it, after a line that
+/// begins with `table`.
+std::vector<double> reportRow(const ResultTable& results, const std::string& table, const std::string& name) {
+  bool inTable = false;
+  for (const std::string& comment : results.comments) {
+    const auto begin = comment.find_first_not_of("# ");
+    const std::string line = begin == std::string::npos ? "" : comment.substr(begin);
+    if (inTable && line.starts_with(name + " ")) {
+      std::istringstream cells(line.substr(name.size()));
+      std::vector<double> numbers;
+      for (double number = 0.0; cells >> number;) numbers.push_back(number);
+      return numbers;
+    }
+    inTable = line.empty() ? false : inTable || line.starts_with(table);
+  }
+  return {};
+}
+
+void replaceInSetup(const ModelFolder& folder, const std::string& from, const std::string& to) {
+  std::string text = folder.read("basin.kdx");
+  const auto at = text.find(from);
+  ASSERT_NE(at, std::string::npos) << from;
+  folder.write("basin.kdx", text.replace(at, from.size(), to));
+}
+
+TEST(LocalSensitivity, OfALinearModelGivesTheCovarianceOfItsClosedForm) {
+  const ModelFolder folder;
+  const ProgramResult run = runProgram({folder.writeSetup({.option = 1})});
+  ASSERT_EQ(run.exitCode, 0) << run.error;
+  const ResultTable results = readResults(folder.read("basin_Sensitivity.dat"));
+  ASSERT_EQ(results.rows.size(), 6U);  // header, base, two sets a parameter
+  EXPECT_EQ(results.rows[1][2], "4");
+  EXPECT_EQ(results.rows[3][2], "4.02");
+
+  // simulated = a + b sin(t / 58) + ...; the observations have a = 5, b = 2, the base set a = 4, b = 1.
+  double s = 0.0;
+  double ss = 0.0;
+  double squares = 0.0;
+  for (int t = 0; t < 365; ++t) {
+    const double sine = std::sin(t / 58.0);
+    s += sine;
+    ss += sine * sine;
+    squares += (1.0 + sine) * (1.0 + sine);
+  }
+  const double variance = squares / 363.0;
+  const double determinant = 365.0 * ss - s * s;
+  const double deviationA = std::sqrt(variance * ss / determinant);
+  const double deviationB = std::sqrt(variance * 365.0 / determinant);
+  const double t = 1.966521;  // 97.5 % quantile of Student's t with 363 degrees of freedom
+  const auto a = reportRow(results, "Parameter (model scale)", "a");
+  const auto b = reportRow(results, "Parameter (model scale)", "b");
+  ASSERT_EQ(a.size(), 4U);
+  ASSERT_EQ(b.size(), 4U);
+  EXPECT_NEAR(a[1] / deviationA, 1.0, 2e-5);
+  EXPECT_NEAR(b[1] / deviationB, 1.0, 2e-5);
+  EXPECT_NEAR(a[2], 4.0 - t * deviationA, 1e-4);
+  EXPECT_NEAR(b[3], 1.0 + t * deviationB, 1e-4);
+  EXPECT_NEAR(reportRow(results, "Correlation", "a")[1], -s / std::sqrt(365.0 * ss), 1e-4);
+  EXPECT_NEAR(reportRow(results, "Covariance", "b")[0], -variance * s / determinant, 1e-7);
+  // d RMSE / da = mean(-1 - sine) / RMSE
+  const double rmse = std::sqrt(squares / 365.0);
+  EXPECT_NEAR(reportRow(results, "Derivatives of objective functions", "a")[0], -(1.0 + s / 365.0) / rmse, 1e-4);
+  EXPECT_THAT(results.comments, Contains(HasSubstr("1. a")));
+
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("\nParameter covariance: 365 observations, 2 parameters, 363 "));
+}
+
+// Misra1a: Statistical Reference Datasets, National Institute of Standards and Technology (public domain); y = b1 (1 -
+// exp(-b2 x)) with the certified values and standard deviations of b1 and b2. The model is a script, x its own affair;
+// the series have one day an observation.
+TEST(LocalSensitivity, OfModelRunsAgreesWithCertifiedStandardDeviations) {
+  const ModelFolder folder;
+  const double y[] = {10.07, 14.73, 17.94, 23.93, 29.61, 35.18, 40.02, 44.82, 50.76, 55.05, 61.01, 66.40, 75.47, 81.78};
+  std::string observed = "time,y\n";
+  for (std::size_t i = 0; i < std::size(y); ++i) observed += fmt::format("2001-01-{:02},{}\n", i + 1, y[i]);
+  folder.write("observed.csv", observed);
+  folder.write("model/run.sh", R"(#!/bin/sh
+exec awk '
+  { value[$1] = $3 }
+  END {
+    n = split("77.6 114.9 141.1 190.8 239.9 289.0 332.8 378.4 434.8 477.3 536.8 593.1 689.1 760.0", x, " ")
+    print "time,y"
+    for (i = 1; i <= n; ++i) printf "2001-01-%02d,%.12g\n", i, value["a"] * (1 - exp(-value["b"] * x[i]))
+  }' parameters.txt >simulated.csv
+)");
+  folder.writeSetup({.option = 1});
+  replaceInSetup(folder, "Initial_Value = 4.0", "Initial_Value = 2.3894212918E+02");
+  replaceInSetup(folder, "Upper_Bound = 10.0", "Upper_Bound = 1000.0");
+  replaceInSetup(folder, "Initial_Value = 1.0", "Initial_Value = 5.5015643181E-04");
+  const ProgramResult run = runProgram({folder.file("basin.kdx")});
+  ASSERT_EQ(run.exitCode, 0) << run.error;
+  const ResultTable results = readResults(folder.read("basin_Sensitivity.dat"));
+  const auto b1 = reportRow(results, "Parameter (model scale)", "a");
+  const auto b2 = reportRow(results, "Parameter (model scale)", "b");
+  ASSERT_EQ(b1.size(), 4U);
+  ASSERT_EQ(b2.size(), 4U);
+  EXPECT_NEAR(b1[1] / 2.7070075241E+00, 1.0, 5e-4);
+  EXPECT_NEAR(b2[1] / 7.2668688436E-06, 1.0, 5e-4);
+  EXPECT_THAT(results.comments, Contains("# Standard error of a residual: 0.101879"));  // 1.0187876330E-01 certified
+  EXPECT_THAT(results.comments, Contains(StartsWith("# Warning: Parameters a and b are correlated by -0.99")));
+}
+
+TEST(LocalSensitivity, WithFewerThanTenModelRunsTheFirstFailureIsFatal) {
+  const ModelFolder folder;
+  EXPECT_EQ(runProgram({folder.writeSetup({.option = 1, .modelArguments = "--fail-above 4.01"})}).exitCode, 1);
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("No of failed simulations too high."));
+  EXPECT_THAT(folder.read("basin.log"), Not(HasSubstr("Derivatives")));
+}
+
+TEST(Uncertainty, SummaryAndBandAreThoseOfTheSample) {
+  const ModelFolder folder;
+  std::string observed = folder.read("observed.csv");
+  const auto second = observed.find("2001-01-02,") + 11;
+  observed.erase(second, observed.find('\n', second) - second);  // a missing value
+  folder.write("observed.csv", observed);
+  // a ~ N(5, 0.5), b ~ N(2, 0.1), 400 sets.
+  const ProgramResult run =
+      runProgram({folder.writeSetup({.option = 3, .maxEvaluations = 400, .modelArguments = "--fail-above 6.2"})});
+  ASSERT_EQ(run.exitCode, 0) << run.error;
+  const ResultTable results = readResults(folder.read("basin.dat"));
+  const auto a = reportRow(results, "Parameter (search scale)", "a");
+  ASSERT_EQ(a.size(), 7U);
+  EXPECT_NEAR(a[0], 5.0, 0.005);
+  EXPECT_NEAR(a[1], 0.5, 0.01);
+  EXPECT_NEAR(a[2], 5.0 - 1.645 * 0.5, 0.02);
+  EXPECT_THAT(results.comments, Contains(StartsWith("# Uncertainty analysis: 400 evaluations, 3 failed")));
+  EXPECT_EQ(reportRow(results, "Output measure", "flow").size(), 7U);
+  EXPECT_LT(std::abs(reportRow(results, "Sample correlation", "a")[1]), 0.15);
+
+  std::istringstream band(folder.read("basin_Band_1.csv"));
+  std::vector<std::string> lines;
+  for (std::string line; std::getline(band, line);) lines.push_back(line);
+  ASSERT_EQ(lines.size(), 2U + 364U);  // the missing observation is not there
+  EXPECT_EQ(lines[0], "# Band of flow");
+  EXPECT_EQ(lines[1], "time,observed,5 %,50 %,95 %");
+  EXPECT_THAT(lines[3], StartsWith("2001-01-03 00:00,"));
+  double values[4];
+  ASSERT_EQ(
+      std::sscanf(lines[2].c_str(), "2001-01-01 00:00,%lf,%lf,%lf,%lf", values, values + 1, values + 2, values + 3), 4);
+  EXPECT_EQ(values[0], 5.0);
+  std::vector<double> simulated;  // at t = 0 the model gives a
+  for (const auto& row : results.rows) {
+    if (row[1] == "OK") simulated.push_back(std::strtod(row[2].c_str(), nullptr));
+  }
+  ASSERT_EQ(simulated.size(), 397U);
+  std::sort(simulated.begin(), simulated.end());
+  const auto quantile = [&](double position) {
+    const auto below = static_cast<std::size_t>(position);
+    return simulated[below] + (position - std::floor(position)) * (simulated[below + 1] - simulated[below]);
+  };
+  EXPECT_NEAR(values[1], quantile(396 * 0.05), 1e-5);
+  EXPECT_NEAR(values[2], quantile(396 * 0.50), 1e-5);
+  EXPECT_NEAR(values[3], quantile(396 * 0.95), 1e-5);
+  EXPECT_THAT(results.comments, Contains("# Band of flow: 100.0 % of 364 observations lie between the 5 and the 95 % "
+                                         "quantile"));
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("\nBand of flow: 100.0 % of 364"));
+}
+
+TEST(Scenarios, ASetOfWrongLengthOrOutOfBoundsIsRefusedByItsName) {
+  const struct {
+    const char* values;
+    const char* message;
+  } cases[] = {{"1, 2", "Error: Invalid number of parameter values in SCENARIO_2"},
+               {"1, 2, 1, 1", "Error: Invalid number of parameter values in SCENARIO_2"},
+               {"11, 2, 1", "Error: Value for parameter a in SCENARIO_2 out of bounds"},
+               {"1, -0.5, 1", "Error: Value for parameter b in SCENARIO_2 out of bounds"}};
+  for (const auto& c : cases) {
+    const ModelFolder folder;
+    const ProgramResult run = runProgram({folder.writeSetup({.option = 0, .scenarios = {"1, 2, 1", c.values}})});
+    EXPECT_EQ(run.exitCode, 1) << c.values;
+    EXPECT_THAT(run.error, StartsWith(c.message));
+    EXPECT_THAT(run.error, HasSubstr("basin.kdx:"));
+    EXPECT_FALSE(folder.has("basin.dat"));
+  }
+}
+
+}  // namespace
+}  // namespace mirevo::testing
