@@ -35,6 +35,7 @@ class RunDriver final {
  private:
   void openRun(const std::string& setupFileName);
   void buildModel();
+  void startWorkers();
   void logSetup();
   void openResults();
   void openResultFile();
@@ -42,9 +43,11 @@ class RunDriver final {
   bool closeResults(std::string_view terminationMessage, std::string& reason);
   void finish(std::string_view terminationMessage);
   int endInError(std::string_view message, std::string_view detail);
-  int endCancelled();
-  /// Log closed, model processes halted, progress ended.
+  int endCancelled(std::string_view message);
+  /// Log closed, model processes halted, MPI job left, progress ended.
   int endEarly(std::string_view ending);
+  /// On an MPI master: stops the workers and finalises MPI; ends the whole job when that is not possible.
+  void leaveJob(int exitCode, std::string_view ending);
   std::vector<std::string> closingLines(std::string_view terminationMessage) const;
 
   RunState state_;
