@@ -29,23 +29,27 @@ constexpr std::array<const char*, 2> kSizeVariables = {"OMPI_COMM_WORLD_SIZE", "
 /// Whatever a launcher or MPI itself puts into the environment of a process of the job.
 constexpr std::array<std::string_view, 6> kJobPrefixes = {"OMPI_", "PMIX_", "PMI_", "ORTE_", "OPAL_", "PRTE_"};
 
-// MPI's own waits spin. A wait here is a probe and a nap; naps grow with the time waited, so that an answer that comes
-// at once is taken at once, and a process that waits long uses well below a hundredth of a core.
+// MPI's own waits spin. A wait here is a probe and a nap, and naps grow with the time since the last message: an answer
+// that comes at once is taken at once, one that takes 50 ms or longer is taken a hundredth of that late on the average,
+// and a process that waits for long uses a few thousandths of a core.
 constexpr double kShortestNap = 50e-6;
-constexpr double kLongestNap = 1e-3;
-constexpr double kLongestIdleNap = 5e-3;
-constexpr double kIdleAfter = 2.0;
-constexpr double kNapShare = 1.0 / 16.0;  ///< of the time waited so far
+constexpr double kLongestNap = 5e-3;
+constexpr double kSteepness = 1.0 / 16.0;  ///< of the nap's growth with the time waited, up to kPlateau
+constexpr double kPlateau = 1e-3;          ///< of 16 ms to 200 ms waiting
+constexpr double kLateSteepness = 1.0 / 200.0;
+
+double napLength(double waited) {
+  const double length = std::min(waited * kSteepness, std::max(kPlateau, waited * kLateSteepness));
+  return std::clamp(length, kShortestNap, kLongestNap);
+}
+
+void nap(double seconds) {
+  const timespec pause{0, static_cast<long>(std::max(seconds, 0.0) * 1e9)};
+  ::nanosleep(&pause, nullptr);
+}
 
 double secondsSince(Clock::time_point start) {
   return std::chrono::duration<double>(Clock::now() - start).count();
-}
-
-void nap(double waited, double left) {
-  const double longest = waited > kIdleAfter ? kLongestIdleNap : kLongestNap;
-  const double seconds = std::min(std::clamp(waited * kNapShare, kShortestNap, longest), left);
-  const timespec pause{0, static_cast<long>(std::max(seconds, 0.0) * 1e9)};
-  ::nanosleep(&pause, nullptr);
 }
 
 std::string errorText(int code) {
@@ -88,13 +92,14 @@ void hideJobFromModels() {
 
 }  // namespace
 
-/// A list, as MPI reads the content and writes the request where they lie.
-struct MpiSession::Sends {
+/// What is on its way, in a list, as MPI reads the content and writes the request where they lie.
+struct MpiSession::Traffic {
   struct Send {
     std::string content;
     MPI_Request request = MPI_REQUEST_NULL;
   };
   std::list<Send> running;
+  Clock::time_point lastMessage = Clock::now();  ///< sent or received
 
   /// Forgets what has arrived.
   void complete() {
@@ -135,7 +140,7 @@ void MpiSession::start() {
   if (code == MPI_SUCCESS && count > 1) {
     rank_ = rank;
     processCount_ = count;
-    sends_ = std::make_unique<Sends>();
+    traffic_ = std::make_unique<Traffic>();
     return;
   }
   if (launched > 1) {
@@ -148,18 +153,19 @@ void MpiSession::start() {
 }
 
 void MpiSession::send(int rank, int tag, std::string content) {
-  sends_->complete();
-  Sends::Send& send = sends_->running.emplace_back();
+  traffic_->complete();
+  Traffic::Send& send = traffic_->running.emplace_back();
   send.content = std::move(content);
   check(MPI_Isend(send.content.data(), static_cast<int>(send.content.size()), MPI_BYTE, rank, tag, MPI_COMM_WORLD,
                   &send.request),
         "MPI_Isend");
+  traffic_->lastMessage = Clock::now();
 }
 
 std::optional<Message> MpiSession::receive(double seconds) {
   const Clock::time_point start = Clock::now();
   while (true) {
-    sends_->complete();
+    traffic_->complete();
     int arrived = 0;
     MPI_Status status;
     check(MPI_Iprobe(MPI_ANY_SOURCE, MPI_ANY_TAG, MPI_COMM_WORLD, &arrived, &status), "MPI_Iprobe");
@@ -171,23 +177,24 @@ std::optional<Message> MpiSession::receive(double seconds) {
       check(MPI_Recv(message.content.data(), size, MPI_BYTE, message.rank, message.tag, MPI_COMM_WORLD,
                      MPI_STATUS_IGNORE),
             "MPI_Recv");
+      traffic_->lastMessage = Clock::now();
       return message;
     }
     const double waited = secondsSince(start);
     if (waited >= seconds) return std::nullopt;
-    nap(waited, seconds - waited);
+    nap(std::min(napLength(secondsSince(traffic_->lastMessage)), seconds - waited));
   }
 }
 
 void MpiSession::finalise(double seconds) {
   if (!inUse()) return;
   const Clock::time_point start = Clock::now();
-  for (sends_->complete(); !sends_->running.empty(); sends_->complete()) {
+  for (traffic_->complete(); !traffic_->running.empty(); traffic_->complete()) {
     const double waited = secondsSince(start);
     if (waited >= seconds) {
       fatalError("Error: MPI communication failed", fmt::format("a message was not taken within {} seconds", seconds));
     }
-    nap(waited, seconds - waited);
+    nap(std::min(napLength(waited), seconds - waited));
   }
   check(MPI_Finalize(), "MPI_Finalize");
   processCount_ = 1;

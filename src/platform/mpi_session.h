@@ -35,10 +35,10 @@ class MpiSession final : public MessageChannel {
   [[noreturn]] void abort(int exitCode);
 
  private:
-  struct Sends;  ///< what is on its way
+  struct Traffic;
   int rank_ = -1;
   int processCount_ = 1;
-  std::unique_ptr<Sends> sends_;
+  std::unique_ptr<Traffic> traffic_;
 };
 
 /// This process's number as the job launcher gave it to its environment, known without MPI; -1 without a launcher.
