@@ -11,7 +11,7 @@ namespace mirevo {
 namespace {
 
 /// Longest time between two looks at the cancellation; a message ends the wait.
-constexpr double kMasterPollSeconds = 1.0;
+constexpr double kMasterPollSeconds = 0.5;
 
 void sendToWorkers(MessageChannel& channel, RankMessage tag, const std::string& content) {
   for (int rank = 1; rank < channel.processCount(); ++rank) channel.send(rank, static_cast<int>(tag), content);

@@ -1,12 +1,11 @@
 #include "evaluation/mpi_worker.h"
 
-#include <array>
-#include <unistd.h>
 #include <utility>
 
 #include <fmt/format.h>
 
 #include "common/fatal_error.h"
+#include "platform/front_end.h"
 
 namespace mirevo {
 namespace {
@@ -31,11 +30,6 @@ Message await(MessageChannel& channel) {
 [[noreturn]] void refuse(const Message& message) {
   fatalError("Error: MPI communication failed",
              fmt::format("rank {} sent a message of kind {} out of turn", message.rank, message.tag));
-}
-
-std::string hostName() {
-  std::array<char, 256> name{};
-  return ::gethostname(name.data(), name.size() - 1) == 0 ? std::string(name.data()) : std::string("unknown host");
 }
 
 bool isExecuting(ModelRunner& runner) {

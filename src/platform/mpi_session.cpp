@@ -6,6 +6,7 @@
 #include <cstdlib>
 #include <ctime>
 #include <list>
+#include <optional>
 #include <string_view>
 #include <unistd.h>
 #include <utility>
@@ -64,18 +65,14 @@ void check(int code, std::string_view call) {
   fatalError("Error: MPI communication failed", fmt::format("{}: {}", call, errorText(code)));
 }
 
-int launchedProcessCount() {
+/// As the launcher says; nothing where it does not.
+std::optional<int> launchedProcessCount() {
   for (const char* name : kSizeVariables) {
     const char* value = std::getenv(name);
     if (value == nullptr) continue;
-    if (const auto count = parseInteger(value)) return *count;
+    if (const auto count = parseInteger(value)) return count;
   }
-  return 1;
-}
-
-bool sizeIsKnown() {
-  return std::any_of(kSizeVariables.begin(), kSizeVariables.end(),
-                     [](const char* name) { return std::getenv(name) != nullptr; });
+  return std::nullopt;
 }
 
 /// A model that uses MPI itself would take itself for a process of this job.
@@ -124,8 +121,8 @@ int launcherRank() {
 }
 
 void MpiSession::start() {
-  const int launched = launchedProcessCount();
-  if (launcherRank() < 0 || (sizeIsKnown() && launched <= 1)) return;
+  const auto launched = launchedProcessCount();
+  if (launched ? *launched <= 1 : launcherRank() < 0) return;
   // Finalising waits in MPI itself; several processes may share a core.
   ::setenv("OMPI_MCA_mpi_yield_when_idle", "1", 0);
   int code = MPI_Init(nullptr, nullptr);
@@ -143,13 +140,12 @@ void MpiSession::start() {
     traffic_ = std::make_unique<Traffic>();
     return;
   }
-  if (launched > 1) {
-    fatalError("Error: The processes of the job cannot reach each other by MPI",
-               fmt::format("A job launcher started {} processes, of which each finds itself alone{}. Start them with "
-                           "the mpirun of the MPI that Mirevo is linked with, or with srun --mpi=pmix.",
-                           launched, code == MPI_SUCCESS ? "" : ": " + errorText(code)));
-  }
   if (code == MPI_SUCCESS) MPI_Finalize();
+  if (!launched) return;
+  fatalError("Error: The processes of the job cannot reach each other by MPI",
+             fmt::format("A job launcher started {} processes, of which each finds itself alone{}. Start them with the "
+                         "mpirun of the MPI that Mirevo is linked with, or with srun --mpi=pmix.",
+                         *launched, code == MPI_SUCCESS ? "" : ": " + errorText(code)));
 }
 
 void MpiSession::send(int rank, int tag, std::string content) {

@@ -57,6 +57,15 @@ class Mpi : public ::testing::Test {
     for (int i = 0; i < count; ++i) values.push_back(fmt::format("{}, {}, 1", 0.45 * i, 0.2 * i));
     return values;
   }
+  /// The process folder with that number, relative to the test's; empty when there is none.
+  std::string processFolder(const RunSettings& settings, int number) const {
+    const std::string parent = settings.processFolder.empty() ? "." : settings.processFolder;
+    for (const auto& entry : std::filesystem::directory_iterator(folder_.file(parent))) {
+      const std::string name = entry.path().filename().string();
+      if (name.starts_with("basin") && name.ends_with(fmt::format("_Process{}", number))) return parent + "/" + name;
+    }
+    return {};
+  }
   std::string log() const { return folder_.read("basin.log"); }
 
   /// Waits until the file holds a process id, and returns that.
@@ -79,8 +88,11 @@ TEST_F(Mpi, AJobWritesTheResultsOfAPlainRun) {
     int processes;
   } cases[] = {
       {{.maxEvaluations = 25}, "basin_Optimisation.dat", 2},
+      {{.option = 3, .maxEvaluations = 15}, "basin.dat", 3},
       // Two of them fail, which is as many as may.
-      {{.option = 0, .scenarios = scenarios(20), .modelArguments = "--fail-above 8"}, "basin.dat", 3},
+      {{.option = 0, .scenarios = scenarios(20), .modelArguments = "--fail-above 8", .processFolder = "scratch/made"},
+       "basin.dat",
+       3},
   };
   useScript("env | grep -cE '^(OMPI|PMIX|PMI)_' > job_variables.txt");
   for (const auto& c : cases) {
@@ -95,10 +107,9 @@ TEST_F(Mpi, AJobWritesTheResultsOfAPlainRun) {
     EXPECT_THAT(log(), ::testing::EndsWith("\n\nNormal termination\n"));
     for (int rank = 1; rank < c.processes; ++rank) {
       // A model that uses MPI itself must not take itself for a process of this job.
-      EXPECT_EQ(folder_.read(fmt::format("basin_Process{}/job_variables.txt", rank)), "0\n");
-      std::filesystem::remove_all(folder_.file(fmt::format("basin_Process{}", rank)));
+      EXPECT_EQ(folder_.read(processFolder(c.settings, rank) + "/job_variables.txt"), "0\n");
     }
-    EXPECT_FALSE(folder_.has("basin_Process0"));
+    EXPECT_EQ(processFolder(c.settings, 0), "");
     EXPECT_THAT(folder_.read("basin._spi_"), ::testing::EndsWith("PROGRE100.0\n"));
   }
 }
