@@ -1,6 +1,7 @@
 #!/usr/bin/env bash
 # Measures MPI jobs of the built program on this machine, whose ranks all share its cores; the model sleeps, so that many
-# fit. Needs mpirun and the targets Mirevo and test_model. Prints a table for docs/performance.
+# fit. Needs mpirun and the targets Mirevo and test_model. The figures in docs/clusters.md
+# come from here.
 #
 #   bench/mpi/measure.sh [build folder] [another Mirevo to compare the start-up with]
 set -euo pipefail
@@ -115,7 +116,7 @@ job() { mpirun --oversubscribe --allow-run-as-root --bind-to none -n "$1" "$buil
 evaluation_rate() { # ranks
   rm -f job*.dat
   job "$1" &
-  local first='' last='' rows=0 seen=0 now
+  local first='' last='' first_rows=0 last_rows=0 rows=0 seen=0 now
   while kill -0 $! 2>/dev/null; do
     if [ -e job.dat ]; then
       rows=$(grep -c OK job.dat || true)
@@ -128,7 +129,7 @@ evaluation_rate() { # ranks
     sleep 0.01
   done
   wait $!
-  awk -v t="$last-$first" -v a="$first" -v b="$last" -v n=$((last_rows - first_rows)) 'BEGIN { printf "%.3f", n / (b - a) }'
+  awk -v a="$first" -v b="$last" -v n=$((last_rows - first_rows)) 'BEGIN { printf "%.3f", n / (b - a) }'
 }
 
 mean_milliseconds() { # command...
@@ -148,12 +149,16 @@ awk -v r="$rate" 'BEGIN { printf "200 runs of 100 ms on 1+8 ranks: %.1f a second
 write_setup 1 12000
 job 3 &
 sleep 3
-ticks() { for p in $(pgrep -x Mirevo -P "$(pgrep -P $1 -x mpirun || echo $1)" || pgrep -x Mirevo); do awk -v p="$p" '{ print p, $14 + $15 }' /proc/$p/stat; done; }
-before=$(ticks $!)
+ticks() { # processor time of this job's ranks, in the order of their starts
+  for process in $(pgrep -x Mirevo); do
+    [ "$(readlink "/proc/$process/cwd")" != "$work" ] || awk '{ print $1, $14 + $15 }' "/proc/$process/stat"
+  done
+}
+before=$(ticks)
 sleep 8
-after=$(ticks $!)
+after=$(ticks)
 wait $!
-echo "share of a core while one worker's model runs and the other one waits, a rank each:"
+echo "share of a core over 8 s in which one worker's model runs and the other one waits, master first:"
 paste <(echo "$before") <(echo "$after") | awk -v hz="$(getconf CLK_TCK)" '{ printf "  %.2f %%\n", ($4 - $2) / hz / 8 * 100 }'
 
 echo "evaluations a second of a 50 ms model, and share of the ideal:"

@@ -29,6 +29,8 @@ namespace {
 constexpr std::string_view kNormalTermination = "Normal termination";
 /// For all workers to have ended their models, which may take a grace time and a kill.
 constexpr double kWorkerStopSeconds = 20.0;
+/// At the end of a task, when a worker that was not needed may still be copying a large base folder.
+constexpr double kWorkerPatienceSeconds = 600.0;
 constexpr double kPatienceSeconds = 3.0;  ///< for an earlier run of the setup that is just ending
 
 std::string environmentValue(const char* name) {
@@ -247,7 +249,7 @@ void RunDriver::leaveJob(int exitCode, std::string_view ending) {
   if (!state_.mpiInUse) return;
   std::string reason = "a worker did not answer the request to stop";
   try {
-    if (stopWorkers(state_.mpi, kWorkerStopSeconds)) {
+    if (stopWorkers(state_.mpi, exitCode == 0 ? kWorkerPatienceSeconds : kWorkerStopSeconds)) {
       state_.mpi.finalise(kWorkerStopSeconds);
       return;
     }
