@@ -52,7 +52,8 @@ void MpiEvaluator::startNext(int rank) {
     stopIfCancelled();
     auto failure = runner_.findUnrunnable(ledger_.set(*place));
     if (!failure) {
-      channel_.send(rank, static_cast<int>(RankMessage::set), encode(ledger_.set(*place)));
+      channel_.send(rank, static_cast<int>(RankMessage::set),
+                    encode(SetMessage{ledger_.numberOf(*place), ledger_.set(*place)}));
       worker(rank).set = *place;
       ledger_.markInitiated(*place);
       return;

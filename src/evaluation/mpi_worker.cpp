@@ -40,17 +40,20 @@ bool isExecuting(ModelRunner& runner) {
 }
 
 /// Runs the model with one set; nothing when the master says stop meanwhile.
-std::optional<ResultMessage> runModel(MessageChannel& channel, ModelRunner& runner, const ParameterSet& set) {
-  if (auto failure = runner.prepareModelRun(set, kSlot)) return ResultMessage{runner.failedResult(*failure), {}};
+std::optional<ResultMessage> runModel(MessageChannel& channel, ModelRunner& runner, const SetMessage& message) {
+  if (auto failure = runner.prepareModelRun(message.set, kSlot))
+    return ResultMessage{runner.failedResult(*failure), {}};
   while (isExecuting(runner)) {
     runner.launcher().waitForChange(kBusyPollSeconds);
-    const auto message = channel.receive(0.0);
-    if (!message) continue;
-    if (message->tag != static_cast<int>(RankMessage::stop)) refuse(*message);
+    const auto arrived = channel.receive(0.0);
+    if (!arrived) continue;
+    if (arrived->tag != static_cast<int>(RankMessage::stop)) refuse(*arrived);
     runner.launcher().haltProcesses();
     return std::nullopt;
   }
-  return ResultMessage{runner.collect(kSlot), runner.launcher().leftBehind(kSlot)};
+  ResultMessage answer{runner.collect(kSlot), runner.launcher().leftBehind(kSlot)};
+  runner.keepOutputFiles(kSlot, message.number, answer.result);
+  return answer;
 }
 
 }  // namespace

@@ -96,15 +96,17 @@ BeginMessage decodeBegin(std::string_view content) {
   return message;
 }
 
-std::string encode(const ParameterSet& set) {
-  return Writer().reals(set).take();
+std::string encode(const SetMessage& message) {
+  return Writer().number(message.number).reals(message.set).take();
 }
 
-ParameterSet decodeSet(std::string_view content) {
+SetMessage decodeSet(std::string_view content) {
   Reader reader(content);
-  ParameterSet set = reader.reals();
+  SetMessage message;
+  message.number = reader.number<int>();
+  message.set = reader.reals();
   reader.expectEnd();
-  return set;
+  return message;
 }
 
 std::string encode(const ReadyMessage& message) {
@@ -129,7 +131,7 @@ std::string encode(const ResultMessage& message) {
     writer.number(static_cast<std::int32_t>(result.failure->kind));
     writer.text(result.failure->reason).texts(result.failure->lastOutput);
   }
-  return writer.text(message.leftBehind).take();
+  return writer.texts(result.warnings).text(message.leftBehind).take();
 }
 
 ResultMessage decodeResult(std::string_view content) {
@@ -145,6 +147,7 @@ ResultMessage decodeResult(std::string_view content) {
     failure.reason = reader.text();
     failure.lastOutput = reader.texts();
   }
+  result.warnings = reader.texts();
   message.leftBehind = reader.text();
   reader.expectEnd();
   return message;

@@ -33,6 +33,12 @@ struct ReadyMessage {
   std::string processFolder;
 };
 
+/// A set to be run.
+struct SetMessage {
+  int number = 0;  ///< in the run, from 1
+  ParameterSet set;
+};
+
 struct ResultMessage {
   EvaluationResult result;
   std::string leftBehind;  ///< what the launcher has to say about processes that had to be ended, or empty
@@ -48,8 +54,8 @@ struct FailureMessage {
 
 std::string encode(const BeginMessage& message);
 BeginMessage decodeBegin(std::string_view content);
-std::string encode(const ParameterSet& set);
-ParameterSet decodeSet(std::string_view content);
+std::string encode(const SetMessage& message);
+SetMessage decodeSet(std::string_view content);
 std::string encode(const ReadyMessage& message);
 ReadyMessage decodeReady(std::string_view content);
 std::string encode(const ResultMessage& message);

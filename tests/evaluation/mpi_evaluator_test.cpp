@@ -17,7 +17,7 @@ using testing::HasSubstr;
 class MpiEvaluatorTest : public EvaluationTest {
  protected:
   MpiEvaluatorTest() : launcher_([](int, const std::string&) { return FakeLauncher::Batch{}; }) {
-    channel_.onSend = [this](const Message& message) { running_[message.rank] = decodeSet(message.content).at(0); };
+    channel_.onSend = [this](const Message& message) { running_[message.rank] = decodeSet(message.content).set.at(0); };
   }
   MpiEvaluator& makeMaster(int planned = 100) {
     makeRunner(launcher_, 0);

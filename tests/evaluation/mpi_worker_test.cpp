@@ -17,7 +17,7 @@ class MpiWorkerTest : public EvaluationTest {
       if (sets_.empty()) {
         channel_.deliver(0, RankMessage::stop, {});
       } else {
-        channel_.deliver(0, RankMessage::set, encode(ParameterSet{sets_.front()}));
+        channel_.deliver(0, RankMessage::set, encode(SetMessage{1, {sets_.front()}}));
         sets_.pop_front();
       }
     };
@@ -72,6 +72,7 @@ TEST(RankMessages, ContentThatWasCutOrHasMoreIsRefused) {
   ResultMessage message;
   message.result.measureValues = {1.0, -0.0};
   message.result.failure = EvaluationFailure{EvaluationFailure::Kind::signal, "why", {"a", ""}};
+  message.result.warnings = {"careful"};
   message.leftBehind = "left";
   const std::string content = encode(message);
   EXPECT_EQ(encode(decodeResult(content)), content);
@@ -79,7 +80,7 @@ TEST(RankMessages, ContentThatWasCutOrHasMoreIsRefused) {
     EXPECT_THROW(decodeResult(content.substr(0, length)), FatalError) << length;
   }
   EXPECT_THROW(decodeResult(content + "x"), FatalError);
-  EXPECT_THROW(decodeSet(std::string(8, '\xff')), FatalError);  // a count that no memory could hold
+  EXPECT_THROW(decodeSet(std::string(12, '\xff')), FatalError);  // a count that no memory could hold
 }
 
 }  // namespace

@@ -88,7 +88,7 @@ TEST_F(Mpi, AJobWritesTheResultsOfAPlainRun) {
     int processes;
   } cases[] = {
       {{.maxEvaluations = 25}, "basin_Optimisation.dat", 2},
-      {{.option = 3, .maxEvaluations = 15}, "basin.dat", 3},
+      {{.option = 3, .maxEvaluations = 15, .savedFile = "model/simulated.csv"}, "basin.dat", 3},
       // Two of them fail, which is as many as may.
       {{.option = 0, .scenarios = scenarios(20), .modelArguments = "--fail-above 8", .processFolder = "scratch/made"},
        "basin.dat",
@@ -110,6 +110,10 @@ TEST_F(Mpi, AJobWritesTheResultsOfAPlainRun) {
       EXPECT_EQ(folder_.read(processFolder(c.settings, rank) + "/job_variables.txt"), "0\n");
     }
     EXPECT_EQ(processFolder(c.settings, 0), "");
+    if (!c.settings.savedFile.empty()) {
+      EXPECT_TRUE(folder_.has("basin_Saved/15/simulated.csv"));
+      EXPECT_EQ(folder_.read("basin_Saved/15/simulated.csv"), folder_.read("basin_Saved.1/15/simulated.csv"));
+    }
     EXPECT_THAT(folder_.read("basin._spi_"), ::testing::EndsWith("PROGRE100.0\n"));
   }
 }
