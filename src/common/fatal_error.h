@@ -21,10 +21,14 @@ class FatalError final : public std::exception {
   std::string detail_;
 };
 
-/// Thrown where a cancelled run stops; caught only by the run driver.
+/// Thrown where a cancelled run stops; caught only by the run driver. `what()` is the message that was written.
 class RunCancelled final : public std::exception {
  public:
-  const char* what() const noexcept override { return "Simulation cancelled"; }
+  explicit RunCancelled(const char* message = "Simulation cancelled") : message_(message) {}
+  const char* what() const noexcept override { return message_; }
+
+ private:
+  const char* message_;
 };
 
 /// Aborts the run: throws FatalError, which the run driver turns into the fixed order of the end (log, model

@@ -3,6 +3,7 @@
 #include <optional>
 #include <vector>
 
+#include "evaluation/evaluation_ledger.h"
 #include "evaluation/evaluation_observer.h"
 #include "evaluation/evaluator.h"
 #include "evaluation/failed_run_policy.h"
@@ -22,27 +23,16 @@ class LocalEvaluator final : public Evaluator {
   void settleAggregates(std::span<EvaluationResult> sample) override;
 
  private:
-  /// One call of evaluateParameterSets(): the sets in their order, from which the slots take the next.
-  struct Batch {
-    std::span<const ParameterSet> sets;
-    std::vector<EvaluationResult> results;
-    std::size_t next = 0;      ///< first set that no slot has taken
-    std::size_t finished = 0;  ///< sets that have a result
-  };
-
   /// Starts the next set on the free slot; sets that cannot be run get their result at once and the one after is taken.
-  void startNext(Batch& batch, int slot);
+  void startNext(int slot);
   /// Takes the results of slots whose batch has ended and starts the next set there; false when none has ended.
-  bool takeFinished(Batch& batch);
-  void finish(Batch& batch, std::size_t set, EvaluationResult result);
+  bool takeFinished();
   void stopIfCancelled();
-  int numberOf(std::size_t set) const { return evaluationCount_ + static_cast<int>(set) + 1; }
 
   ModelRunner& runner_;
   EvaluationObserver& observer_;
-  FailedRunPolicy& failedRuns_;
+  EvaluationLedger ledger_;
   std::vector<std::optional<std::size_t>> slots_;  ///< the set that runs in each slot, by its place in the batch
-  int evaluationCount_ = 0;                        ///< sets of the batches before this one
 };
 
 }  // namespace mirevo

@@ -38,6 +38,11 @@ EvaluationFailure::Kind failureKind(BatchFailure::Kind kind) {
   }
 }
 
+EvaluationFailure parameterFailure(const ParameterFailure& failure) {
+  const bool violated = failure.kind == ParameterFailure::Kind::constraintViolated;
+  return {violated ? Kind::constraintsViolated : Kind::equationNotFinite, failure.detail, {}};
+}
+
 std::string_view resistanceUpdateText(ResistanceUpdate outcome) {
   switch (outcome) {
     case ResistanceUpdate::updated:
@@ -88,7 +93,7 @@ ModelRunner::ModelRunner(ModelDescription description, ParameterModel& parameter
     if (measure.interfaceType != InterfaceType::timeSeries) continue;
     observedSeries_.push_back(readObservedSeries(i, measure, description_.period, series_.observation(i)));
   }
-  if (!launcher_.initialise(launcherSettings)) {
+  if (launcherSettings.slotCount > 0 && !launcher_.initialise(launcherSettings)) {
     fatalError("Error: Unable to initialise MirevoSimpleLaunch", launcher_.lastError());
   }
   for (int slot = 1; slot <= launcherSettings.slotCount; ++slot) {
@@ -149,12 +154,15 @@ std::string ModelRunner::slotPath(const std::string& baseFile, int slot) const {
   return launcher_.getProcessFolder(slot) + std::string(trimTrailing(baseFile).substr(description_.baseFolder.size()));
 }
 
+std::optional<EvaluationFailure> ModelRunner::findUnrunnable(std::span<const double> set) {
+  const auto mapped = parameters_.MapToModelValues(set);
+  if (const auto* failure = std::get_if<ParameterFailure>(&mapped)) return parameterFailure(*failure);
+  return std::nullopt;
+}
+
 std::optional<EvaluationFailure> ModelRunner::prepareModelRun(std::span<const double> set, int slot) {
   const auto mapped = parameters_.MapToModelValues(set);
-  if (const auto* failure = std::get_if<ParameterFailure>(&mapped)) {
-    const bool violated = failure->kind == ParameterFailure::Kind::constraintViolated;
-    return EvaluationFailure{violated ? Kind::constraintsViolated : Kind::equationNotFinite, failure->detail, {}};
-  }
+  if (const auto* failure = std::get_if<ParameterFailure>(&mapped)) return parameterFailure(*failure);
   const auto modelValues = std::get<std::span<const double>>(mapped);
   const SlotFiles& files = slots_.at(static_cast<std::size_t>(slot - 1));
   // What a run did not write must never be taken for its result.

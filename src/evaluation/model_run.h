@@ -37,9 +37,13 @@ struct ModelDescription {
 class ModelRunner final {
  public:
   /// Reads and checks the templates and opens the observed series (all before any folder is made), then has the
-  /// launcher make the slots' folders. Throws FatalError.
+  /// launcher make the slots' folders; with a slot count of 0 (the MPI master, which runs no model) the launcher is not
+  /// asked for anything. Throws FatalError.
   ModelRunner(ModelDescription description, ParameterModel& parameters, ObjectiveAggregator& aggregator,
               ProcessLauncher& launcher, const LauncherSettings& launcherSettings);
+
+  /// Why the set cannot be run, if that is so.
+  std::optional<EvaluationFailure> findUnrunnable(std::span<const double> set);
 
   /// Builds the full parameter vector, removes the results of the slot's last run, writes the parameter files and
   /// starts the batch; or says why the set is not run. Throws FatalError when a file cannot be removed or written.

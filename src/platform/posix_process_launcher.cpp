@@ -168,13 +168,14 @@ bool PosixProcessLauncher::initialise(const LauncherSettings& settings) {
 void PosixProcessLauncher::prepareSlot(const LauncherSettings& settings, int number,
                                        const std::vector<std::vector<std::string>>& arguments) {
   Slot& slot = slots_.emplace_back();
-  slot.folder = settings.processFolderPrefix + std::to_string(number);
+  slot.folder = settings.processFolderPrefix + std::to_string(settings.firstFolderNumber + number - 1);
   std::error_code ignored;
   const auto base = std::filesystem::weakly_canonical(settings.baseFolder, ignored);
   if (liesIn(base, std::filesystem::weakly_canonical(slot.folder, ignored))) {
     fatalError(fmt::format("The model's folder {} lies in the process folder {}, which is made anew for every run",
                            settings.baseFolder, slot.folder));
   }
+  std::filesystem::create_directories(std::filesystem::path(slot.folder).parent_path(), ignored);
   makeProcessFolder(settings.baseFolder, slot.folder, settings.processFolderPrefix);
   if (!renewLog(slot)) {
     fatalError(fmt::format("Unable to create {}/{}: {}", slot.folder, kBatchLogName, std::strerror(errno)));

@@ -14,9 +14,10 @@ struct BatchItem {
 
 struct LauncherSettings {
   std::string baseFolder;             ///< absolute; holds the first batch file, is copied and never written
-  std::string processFolderPrefix;    ///< absolute; slot n runs in this text followed by n
+  std::string processFolderPrefix;    ///< absolute; a slot runs in this text followed by its folder's number
   std::vector<BatchItem> batchItems;  ///< at least one
   int slotCount = 1;
+  int firstFolderNumber = 1;     ///< the number of slot 1's folder; the other slots' follow
   bool useSingleThread = false;  ///< set the usual thread-count variables to 1 for the model
   double graceSeconds = 2.0;     ///< between SIGTERM and SIGKILL when processes are halted
 };

@@ -10,6 +10,7 @@
 #include <fmt/format.h>
 
 #include "platform/front_end.h"
+#include "platform/mpi_session.h"
 #include "run/run_driver.h"
 #include "run/stop_run.h"
 #include "run/version.h"
@@ -45,11 +46,6 @@ void answerQuestion(const std::string& argument) {
   }
 }
 
-/// Whether a job launcher started the program: it watches over its processes, which must stay those that it started.
-bool isPartOfJob() {
-  return std::getenv("OMPI_COMM_WORLD_SIZE") != nullptr || std::getenv("PMI_SIZE") != nullptr;
-}
-
 /// A run whose caller has closed standard input, output or error would open its files in their place, and messages
 /// would end up in the results.
 void occupyStandardDescriptors() {
@@ -68,7 +64,9 @@ void processStart(int argc, char** argv) {
   if (!commandLine.wantsProgressViewer()) runWithFrontEnd("G48=WIN", commandLine);
   const auto run = [&commandLine] { runWithFrontEnd("G48=QMON", commandLine); };
   const std::string setupFileName(commandLine.setupFileName());
-  if (setupFileName.empty() || isQuestion(setupFileName) || isPartOfJob()) run();
+  // A job launcher watches over its processes, which must stay those that it started.
+  const bool isPartOfJob = launcherRank() >= 0;
+  if (setupFileName.empty() || isQuestion(setupFileName) || isPartOfJob) run();
   qmonExit(qmonStart(setupFileName, run));
 }
 
@@ -82,12 +80,14 @@ void runWithFrontEnd(std::string_view environmentSetting, const CommandLine& com
 
 void mirevoMain(const CommandLine& commandLine) {
   const std::string setupFileName(commandLine.setupFileName());
+  const bool answers = launcherRank() <= 0;  // one process of a job
   if (setupFileName.empty()) {
+    if (!answers) stopRun(0);  // a launcher that sees this process fail ends the one that answers
     showMessage(kUsage);
     stopRun(1);
   }
   if (isQuestion(setupFileName)) {
-    answerQuestion(setupFileName);
+    if (answers) answerQuestion(setupFileName);
     stopRun(0);
   }
   int exitCode = 1;

@@ -75,6 +75,7 @@ struct RunConfig {
 
   std::int32_t simultaneousSimulations = 1;
   bool useSingleThread = false;
+  std::string processFolder;  ///< where the process folders are made; empty: beside the setup
 
   /// Model evaluations that the task plans; sizes the failed-run limit and the progress report. 0 where the simulation
   /// option names no task.

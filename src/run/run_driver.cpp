@@ -7,10 +7,13 @@
 #include <fmt/format.h>
 
 #include "common/fatal_error.h"
+#include "common/files.h"
 #include "common/text.h"
 #include "evaluation/local_evaluator.h"
+#include "evaluation/mpi_evaluator.h"
 #include "platform/posix_process_launcher.h"
 #include "run/mpi_start.h"
+#include "run/run_model.h"
 #include "run/setup_reader.h"
 #include "run/setup_summary.h"
 #include "run/setup_warnings.h"
@@ -18,41 +21,21 @@
 #include "run/signal_state.h"
 #include "run/tasks.h"
 #include "run/version.h"
+#include "run/worker_run.h"
 
 namespace mirevo {
 namespace {
 
 constexpr std::string_view kNormalTermination = "Normal termination";
+/// For all workers to have ended their models, which may take a grace time and a kill.
+constexpr double kWorkerStopSeconds = 20.0;
+/// At the end of a task, when a worker that was not needed may still be copying a large base folder.
+constexpr double kWorkerPatienceSeconds = 600.0;
 constexpr double kPatienceSeconds = 3.0;  ///< for an earlier run of the setup that is just ending
 
 std::string environmentValue(const char* name) {
   const char* value = std::getenv(name);
   return value == nullptr ? std::string{} : std::string(value);
-}
-
-ModelDescription describeModel(const RunConfig& config, const std::string& filePrefix) {
-  ModelDescription model;
-  model.baseFolder = config.baseFolder;
-  model.fileTag = config.setupName;
-  model.parameterFiles = config.parameterFiles;
-  model.measures = config.measures;
-  model.measureFile = config.measureFile;
-  model.period = config.period;
-  model.objectives = config.objectives;
-  model.savedFiles = config.savedOutputFiles;
-  model.savedFolder = filePrefix + "_Saved";
-  model.keepSimulatedValues = keepsSimulatedValues(config);
-  return model;
-}
-
-LauncherSettings launcherSettings(const RunConfig& config, const std::string& filePrefix) {
-  LauncherSettings settings;
-  settings.baseFolder = config.baseFolder;
-  settings.processFolderPrefix = filePrefix + "_Process";
-  settings.batchItems = config.batchItems;
-  settings.slotCount = config.simultaneousSimulations;
-  settings.useSingleThread = config.useSingleThread;
-  return settings;
 }
 
 }  // namespace
@@ -66,9 +49,12 @@ RunDriver::~RunDriver() {
 int RunDriver::run(const std::string& setupFileName) {
   try {
     startMpi(state_);
+    if (state_.mpiRank > 0) return runWorker(state_.mpi);
     openRun(setupFileName);
     config_ = readSetupFile(setupFileName, state_.log);
+    if (state_.mpiInUse) config_.simultaneousSimulations = 1;  // a model run a worker
     buildModel();
+    if (state_.mpiInUse) startWorkers();
     logSetup();
     openResults();
     state_.progress.writeMessage("Title: " + config_.title);
@@ -80,8 +66,8 @@ int RunDriver::run(const std::string& setupFileName) {
     return 0;
   } catch (const FatalError& error) {
     return endInError(error.message(), error.detail());
-  } catch (const RunCancelled&) {
-    return endCancelled();
+  } catch (const RunCancelled& cancelled) {
+    return endCancelled(cancelled.what());
   } catch (const std::bad_alloc&) {
     return endInError(
         evaluator_ ? "Error: Unable to allocate memory" : "Error: Unable to allocate memory in MIREVO setup", {});
@@ -120,8 +106,16 @@ void RunDriver::buildModel() {
   aggregator_ = std::make_unique<ObjectiveAggregator>(config_.objectives, config_.aggregationMethod);
   launcher_ = std::make_unique<PosixProcessLauncher>();
   signalState.haltProcesses = haltProcessesFromSignal;
-  runner_ = std::make_unique<ModelRunner>(describeModel(config_, filePrefix_), *parameters_, *aggregator_, *launcher_,
-                                          launcherSettings(config_, filePrefix_));
+  const int slotCount = state_.mpiInUse ? 0 : config_.simultaneousSimulations;  // the master runs no model
+  runner_ = std::make_unique<ModelRunner>(describeModel(config_), *parameters_, *aggregator_, *launcher_,
+                                          launcherSettings(config_, slotCount));
+}
+
+void RunDriver::startWorkers() {
+  std::string reason;
+  auto text = readTextFile(config_.setupFile, reason);
+  if (!text) fatalError("Error: Unable to open " + config_.setupFile, reason);
+  beginWorkers(state_.mpi, {config_.setupFile, std::move(*text)});
 }
 
 void RunDriver::logSetup() {
@@ -134,6 +128,10 @@ void RunDriver::logSetup() {
     for (const std::string& text : parameterTemplate.narrowPlaceholderWarnings(config_.parameters)) {
       state_.log.warning(text);
     }
+  }
+  if (state_.mpiInUse) {
+    state_.log.line(fmt::format("MPI job: this master and {} workers, each of which runs one model at a time",
+                                state_.mpiProcessCount - 1));
   }
   state_.log.line("");
 }
@@ -151,8 +149,12 @@ void RunDriver::openResults() {
   }
   reporter_ = std::make_unique<RunReporter>(state_, results_, *failedRunFile_, space);
   failedRunPolicy_.emplace(config_.plannedEvaluations());
-  evaluator_ =
-      std::make_unique<LocalEvaluator>(*runner_, *reporter_, *failedRunPolicy_, config_.simultaneousSimulations);
+  if (state_.mpiInUse) {
+    evaluator_ = std::make_unique<MpiEvaluator>(*runner_, state_.mpi, *reporter_, *failedRunPolicy_);
+  } else {
+    evaluator_ =
+        std::make_unique<LocalEvaluator>(*runner_, *reporter_, *failedRunPolicy_, config_.simultaneousSimulations);
+  }
 }
 
 void RunDriver::openResultFile() {
@@ -211,6 +213,7 @@ void RunDriver::finish(const TaskOutcome& outcome) {
   }
   signalState.runLogDescriptor = -1;
   state_.log.close();
+  leaveJob(0, kNormalTermination);
   state_.progress.progressEnd(kNormalTermination);
 }
 
@@ -228,21 +231,38 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
   return endEarly(message);
 }
 
-int RunDriver::endCancelled() {
-  showMessage("Simulation cancelled");
+int RunDriver::endCancelled(std::string_view message) {
+  showMessage(message);
   std::string reason;
-  if (!closeResults("Simulation cancelled", reason)) {
+  if (!closeResults(message, reason)) {
     state_.log.line(fmt::format("Error: Unable to write to {}\n{}", results_.path(), reason));
   }
-  return endEarly("Simulation cancelled");
+  return endEarly(message);
 }
 
 int RunDriver::endEarly(std::string_view ending) {
   signalState.runLogDescriptor = -1;
   state_.log.close();
   if (launcher_) launcher_->haltProcesses();
+  leaveJob(1, ending);
   state_.progress.progressEnd(ending);
   return 1;
+}
+
+void RunDriver::leaveJob(int exitCode, std::string_view ending) {
+  if (!state_.mpiInUse) return;
+  std::string reason = "a worker did not answer the request to stop";
+  try {
+    if (stopWorkers(state_.mpi, exitCode == 0 ? kWorkerPatienceSeconds : kWorkerStopSeconds)) {
+      state_.mpi.finalise(kWorkerStopSeconds);
+      return;
+    }
+  } catch (const FatalError& error) {
+    reason = error.message() + "\n" + error.detail();
+  }
+  showMessage("Warning: All processes of the MPI job are aborted: " + reason);
+  state_.progress.progressEnd(ending);
+  state_.mpi.abort(exitCode);
 }
 
 }  // namespace mirevo

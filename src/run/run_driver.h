@@ -37,6 +37,7 @@ class RunDriver final {
  private:
   void openRun(const std::string& setupFileName);
   void buildModel();
+  void startWorkers();
   void logSetup();
   void openResults();
   void openResultFile();
@@ -45,9 +46,11 @@ class RunDriver final {
   bool closeResults(std::string_view terminationMessage, std::string& reason, std::span<const std::string> report = {});
   void finish(const TaskOutcome& outcome);
   int endInError(std::string_view message, std::string_view detail);
-  int endCancelled();
-  /// Log closed, model processes halted, progress ended.
+  int endCancelled(std::string_view message);
+  /// Log closed, model processes halted, MPI job left, progress ended.
   int endEarly(std::string_view ending);
+  /// On an MPI master: stops the workers and finalises MPI; ends the whole job when that is not possible.
+  void leaveJob(int exitCode, std::string_view ending);
   std::vector<std::string> closingLines(std::string_view terminationMessage) const;
 
   RunState state_;

@@ -3,6 +3,7 @@
 #include <vector>
 
 #include "platform/front_end.h"
+#include "platform/mpi_session.h"
 #include "run/progress_reporter.h"
 #include "run/run_log.h"
 
@@ -10,6 +11,7 @@ namespace mirevo {
 
 /// What a run has once, owned by the run driver and handed down.
 struct RunState {
+  MpiSession mpi;
   int mpiRank = -1;  ///< -1 without MPI, 0 the master, above 0 a worker
   int mpiProcessCount = 1;
   bool mpiInUse = false;

@@ -32,6 +32,11 @@ void validateDate(const DateRecord& date, std::string_view keyword, const SetupS
 }  // namespace
 
 void validateParameterBounds(const ModelParameter& parameter, const SetupSection& section) {
+  // First, as the initial value lies outside such bounds whatever it is.
+  if (parameter.lowerBound > parameter.upperBound) {
+    section.refuse("Error: Lower bound larger than upper bound for parameter " + parameter.name, "Lower_Bound",
+                   fmt::format("expected {} or less, found {}", parameter.upperBound, parameter.lowerBound));
+  }
   if (parameter.initialValue < parameter.lowerBound) {
     section.refuse("Error: Initial parameter value smaller than lower bound for parameter " + parameter.name,
                    "Initial_Value",
@@ -41,10 +46,6 @@ void validateParameterBounds(const ModelParameter& parameter, const SetupSection
     section.refuse("Error: Initial parameter value larger than upper bound for parameter " + parameter.name,
                    "Initial_Value",
                    fmt::format("expected {} or less, found {}", parameter.upperBound, parameter.initialValue));
-  }
-  if (parameter.lowerBound > parameter.upperBound) {
-    section.refuse("Error: Lower bound larger than upper bound for parameter " + parameter.name, "Lower_Bound",
-                   fmt::format("expected {} or less, found {}", parameter.upperBound, parameter.lowerBound));
   }
 }
 

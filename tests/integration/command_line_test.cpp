@@ -44,7 +44,7 @@ TEST(CommandLine, AMissingSetupFileIsNamedOnStandardErrorAndInTheLog) {
   EXPECT_THAT(nowhere.error, HasSubstr(folder.file("no/such/folder/basin")));
 }
 
-TEST(CommandLine, AJobOfSeveralProcessesIsRefusedBeforeAnyFileIsTouched) {
+TEST(CommandLine, AJobWhoseLauncherIsOfAnotherMpiIsRefusedBeforeAnyFileIsTouched) {
   const ModelFolder folder;
   for (const char* variable : {"OMPI_COMM_WORLD_SIZE", "PMI_SIZE"}) {
     const ProgramResult result = runProgram({folder.writeSetup({})}, {{variable, "4"}});

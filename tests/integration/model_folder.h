@@ -24,6 +24,7 @@ struct RunSettings {
   std::string simulationFile = "model/simulated.csv";
   std::string observationFile = "observed.csv";
   std::string savedFile = {};  ///< an output file that is kept of every evaluation; none when empty
+  std::string processFolder = {};
 };
 
 /// A folder with the model, its observations (made with a = 5, b = 2, c = 1) and a setup file `basin.kdx`. Parameters:
@@ -205,10 +206,11 @@ class ModelFolder : public TemporaryFolder {
   [SimultaneousSimulations]
     NoSimultaneousSim = {2}
     UseSingleThread = 0
+    ProcessFolder = '{3}'
   [/SimultaneousSimulations]
 [/MIREVO_PARAMETERS]
 )",
-                        settings.seed, settings.maxEvaluations, settings.slots);
+                        settings.seed, settings.maxEvaluations, settings.slots, settings.processFolder);
     return text;
   }
 };

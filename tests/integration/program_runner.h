@@ -27,22 +27,23 @@ struct ProgramResult {
   std::string error;
 };
 
-/// The built program, started as its user starts it. It is killed when it outlives its time or the test.
+/// The built program, or what starts it, as its user starts it. It is killed when it outlives its time or the test.
 class RunningProgram {
  public:
   using Environment = std::map<std::string, std::string>;
 
-  explicit RunningProgram(const std::vector<std::string>& arguments, const Environment& environment = {}) {
+  explicit RunningProgram(const std::vector<std::string>& arguments, const Environment& environment = {},
+                          const char* program = MIREVO_PROGRAM) {
     process_ = ::fork();
     if (process_ != 0) return;
     ::dup2(::open(outputs_.file("out").c_str(), O_WRONLY | O_CREAT, 0666), STDOUT_FILENO);
     ::dup2(::open(outputs_.file("err").c_str(), O_WRONLY | O_CREAT, 0666), STDERR_FILENO);
     for (const char* name : {"G48", "BUILDMODE", "VOLK_PROGRESS"}) ::unsetenv(name);
     for (const auto& [name, value] : environment) ::setenv(name.c_str(), value.c_str(), 1);
-    std::vector<char*> argv{const_cast<char*>(MIREVO_PROGRAM)};
+    std::vector<char*> argv{const_cast<char*>(program)};
     for (const std::string& argument : arguments) argv.push_back(const_cast<char*>(argument.c_str()));
     argv.push_back(nullptr);
-    ::execv(MIREVO_PROGRAM, argv.data());
+    ::execvp(program, argv.data());
     ::_exit(127);
   }
   ~RunningProgram() {

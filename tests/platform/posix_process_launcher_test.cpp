@@ -330,8 +330,8 @@ TEST_F(PosixProcessLauncherTest, RefusesToStartWithAReason) {
        "Arguments of " + base + "/run.sh: expected a closing ' for the one at character 1: 'open"},
       {folder_ / "run_Process", folder_ / "other/run.sh", "",
        (folder_ / "other/run.sh") + " does not lie in the model's folder " + base},
-      {folder_ / "missing/run_Process", base + "/run.sh", "",
-       "Unable to create the folder " + (folder_ / "missing/run_Process1") + ": No such file or directory"},
+      {base + "/run.sh/run_Process", base + "/run.sh", "",
+       "Unable to look at " + base + "/run.sh/run_Process1: Not a directory"},
   };
   for (const auto& c : cases) {
     settings_.processFolderPrefix = c.prefix;

@@ -1,0 +1,66 @@
+#include "evaluation/evaluation_ledger.h"
+
+#include <utility>
+
+#include "common/text.h"
+
+namespace mirevo {
+
+void EvaluationLedger::begin(std::span<const ParameterSet> sets) {
+  sets_ = sets;
+  results_.assign(sets.size(), {});
+  next_ = 0;
+  finishedCount_ = 0;
+}
+
+std::optional<std::size_t> EvaluationLedger::takeNext() {
+  if (next_ == sets_.size()) return std::nullopt;
+  return next_++;
+}
+
+void EvaluationLedger::markInitiated(std::size_t place) {
+  observer_.message(withNumber("Evaluation of parameter set No. % initiated", numberOf(place)));
+}
+
+void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::string_view leftBehind) {
+  result.number = numberOf(place);
+  if (!leftBehind.empty()) {
+    observer_.warning(withNumber("Evaluation of parameter set No. %: ", result.number).append(leftBehind));
+  }
+  for (const std::string& text : result.warnings) {
+    observer_.warning(withNumber("Evaluation of parameter set No. %: ", result.number) + text);
+  }
+  std::string_view outcome = "Evaluation of parameter set No. % completed: OK";
+  if (!result.ok()) {
+    outcome = result.failure->kind == EvaluationFailure::Kind::constraintsViolated
+                  ? "Evaluation of parameter set No. % completed: FAILED - parameter constraints violated"
+                  : "Evaluation of parameter set No. % completed: FAILED - model run error";
+  }
+  observer_.message(withNumber(outcome, result.number));
+  observer_.evaluationFinished(sets_[place], result);
+  if (!result.ok()) failedRuns_.countFailure(result.number, *result.failure);
+  results_[place] = std::move(result);
+  ++finishedCount_;
+}
+
+std::vector<EvaluationResult> EvaluationLedger::end() {
+  evaluationCount_ += static_cast<int>(sets_.size());
+  sets_ = {};
+  next_ = 0;
+  finishedCount_ = 0;
+  return std::exchange(results_, {});
+}
+
+void settleAggregates(ObjectiveAggregator& aggregator, std::span<EvaluationResult> sample) {
+  if (aggregator.isSettled()) return;
+  std::vector<std::vector<double>> succeeded;
+  for (const EvaluationResult& result : sample) {
+    if (result.ok()) succeeded.push_back(result.objectiveValues);
+  }
+  aggregator.fit(succeeded);
+  for (EvaluationResult& result : sample) {
+    if (result.ok()) result.aggregate = aggregator.aggregate(result.objectiveValues);
+  }
+}
+
+}  // namespace mirevo

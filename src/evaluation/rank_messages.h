@@ -1,0 +1,66 @@
+#pragma once
+
+#include <string>
+#include <string_view>
+
+#include "common/parameter_set.h"
+#include "evaluation/evaluation_result.h"
+
+namespace mirevo {
+
+/// What the master (rank 0) and its workers tell each other.
+///
+///   master                          worker
+///     | begin (setup) ---------------> |  reads the setup, makes its process folder
+///     | <-------------- ready (place)  |
+///     | set -------------------------> |  runs the model                            as often as there are sets
+///     | <-------------------- result   |
+///     | stop ------------------------> |  at any time; ends its model's processes
+///     | <------------------ farewell   |  then both finalise MPI
+///
+/// A worker that meets a fatal error sends `failure` at any time and waits for `stop`.
+enum class RankMessage : int { begin = 1, set, stop, ready, result, failure, farewell };
+
+/// The master's setup file as it read it, so that all ranks work from the same text.
+struct BeginMessage {
+  std::string setupFile;  ///< absolute path
+  std::string text;
+};
+
+/// Where a worker is.
+struct ReadyMessage {
+  std::string host;
+  std::string processFolder;
+};
+
+/// A set to be run.
+struct SetMessage {
+  int number = 0;  ///< in the run, from 1
+  ParameterSet set;
+};
+
+struct ResultMessage {
+  EvaluationResult result;
+  std::string leftBehind;  ///< what the launcher has to say about processes that had to be ended, or empty
+};
+
+struct FailureMessage {
+  std::string message;
+  std::string detail;
+};
+
+// Numbers cross as their own bytes, so that a result is the same bits as a local one. Each decode function throws
+// FatalError for content that its encode function cannot have made.
+
+std::string encode(const BeginMessage& message);
+BeginMessage decodeBegin(std::string_view content);
+std::string encode(const SetMessage& message);
+SetMessage decodeSet(std::string_view content);
+std::string encode(const ReadyMessage& message);
+ReadyMessage decodeReady(std::string_view content);
+std::string encode(const ResultMessage& message);
+ResultMessage decodeResult(std::string_view content);
+std::string encode(const FailureMessage& message);
+FailureMessage decodeFailure(std::string_view content);
+
+}  // namespace mirevo

@@ -1,0 +1,169 @@
+#include "evaluation/mpi_evaluator.h"
+
+#include <cmath>
+
+#include "evaluation/evaluation_fixture.h"
+#include "evaluation/fake_channel.h"
+#include "evaluation/fake_launcher.h"
+
+namespace mirevo {
+namespace {
+
+using testing::Contains;
+using testing::ElementsAre;
+using testing::HasSubstr;
+
+/// A master with workers that answer when the test lets them: each result is the set's value less 1.
+class MpiEvaluatorTest : public EvaluationTest {
+ protected:
+  MpiEvaluatorTest() : launcher_([](int, const std::string&) { return FakeLauncher::Batch{}; }) {
+    channel_.onSend = [this](const Message& message) { running_[message.rank] = decodeSet(message.content).set.at(0); };
+  }
+  MpiEvaluator& makeMaster(int planned = 100) {
+    makeRunner(launcher_, 0);
+    failedRuns_ = std::make_unique<FailedRunPolicy>(planned);
+    master_ = std::make_unique<MpiEvaluator>(*runner_, channel_, observer_, *failedRuns_);
+    return *master_;
+  }
+  void becomeReady(int rank) { channel_.deliver(rank, RankMessage::ready, encode(ReadyMessage{"node", "/folder"})); }
+  void answer(int rank) {
+    ResultMessage message;
+    message.result.measureValues = {running_.at(rank) - 1.0};
+    message.result.objectiveValues = {std::abs(running_.at(rank) - 1.0)};
+    message.result.aggregate = -99.0;  // the worker's own, which counts for nothing
+    channel_.deliver(rank, RankMessage::result, encode(message));
+    running_.erase(rank);
+  }
+  /// The running workers answer one by one, those first whose set has the largest value.
+  void answerLargestFirst() {
+    channel_.onReceive = [this](double) {
+      if (!channel_.arriving.empty() || running_.empty()) return;
+      int first = running_.begin()->first;
+      for (const auto& [rank, value] : running_) {
+        if (value > running_.at(first)) first = rank;
+      }
+      answer(first);
+    };
+  }
+
+  FakeLauncher launcher_;
+  FakeChannel channel_{3};
+  std::map<int, double> running_;  ///< the set's value, by rank
+  std::unique_ptr<MpiEvaluator> master_;
+};
+
+TEST_F(MpiEvaluatorTest, WhoeverIsFreeGetsTheNextSetAndResultsStandInTheOrderOfTheSets) {
+  MpiEvaluator& master = makeMaster();
+  becomeReady(2);
+  becomeReady(1);
+  answerLargestFirst();
+  const auto results =
+      master.evaluateParameterSets(std::vector<ParameterSet>{{4.0}, {2.0}, {3.0}, {6.0}}, DispatchMode::task);
+  std::vector<double> measures;
+  for (const EvaluationResult& result : results) measures.push_back(result.measureValues.at(0));
+  EXPECT_THAT(measures, ElementsAre(3.0, 1.0, 2.0, 5.0));
+  EXPECT_THAT(
+      observer_.events,
+      ElementsAre("Worker 2 is ready on node, process folder /folder", "Evaluation of parameter set No. 1 initiated",
+                  "Worker 1 is ready on node, process folder /folder", "Evaluation of parameter set No. 2 initiated",
+                  "Evaluation of parameter set No. 1 completed: OK", "record 1 a=4 OK",
+                  "Evaluation of parameter set No. 3 initiated", "Evaluation of parameter set No. 3 completed: OK",
+                  "record 3 a=3 OK", "Evaluation of parameter set No. 4 initiated",
+                  "Evaluation of parameter set No. 4 completed: OK", "record 4 a=6 OK",
+                  "Evaluation of parameter set No. 2 completed: OK", "record 2 a=2 OK"));
+  std::vector<int> receivers;
+  for (const Message& message : channel_.sent) receivers.push_back(message.rank);
+  EXPECT_THAT(receivers, ElementsAre(2, 1, 2, 2));
+
+  // The numbers go on, and of two free workers the first is taken.
+  const auto next = master.evaluateParameterSets(std::vector<ParameterSet>{{1.0}}, DispatchMode::task);
+  EXPECT_EQ(next.at(0).number, 5);
+  EXPECT_EQ(channel_.sent.back().rank, 1);
+  EXPECT_EQ(launcher_.starts, 0);
+}
+
+TEST_F(MpiEvaluatorTest, SetsThatCannotBeRunAreSentToNobody) {
+  MpiEvaluator& master = makeMaster();
+  becomeReady(1);
+  answerLargestFirst();
+  const auto results = master.evaluateParameterSets(std::vector<ParameterSet>{{9.5}, {5.0}, {2.0}}, DispatchMode::task);
+  EXPECT_EQ(channel_.sent.size(), 1U);
+  EXPECT_EQ(results[0].failure->kind, EvaluationFailure::Kind::constraintsViolated);
+  EXPECT_EQ(results[1].failure->kind, EvaluationFailure::Kind::equationNotFinite);
+  EXPECT_THAT(observer_.events,
+              Contains("Evaluation of parameter set No. 1 completed: FAILED - parameter constraints violated"));
+}
+
+TEST_F(MpiEvaluatorTest, TheMasterComputesAggregatesAsItAloneKnowsTheTransformation) {
+  method_ = AggregationMethod::commonProbability;
+  MpiEvaluator& master = makeMaster();
+  becomeReady(1);
+  answerLargestFirst();
+  auto sample = master.evaluateParameterSets(std::vector<ParameterSet>{{2.0}, {3.0}, {4.0}}, DispatchMode::task);
+  EXPECT_TRUE(std::isnan(sample[0].aggregate));
+  master.settleAggregates(sample);
+  const auto later = master.evaluateParameterSets(std::vector<ParameterSet>{{2.0}}, DispatchMode::task);
+  EXPECT_FALSE(std::isnan(later[0].aggregate));
+  EXPECT_EQ(later[0].aggregate, sample[0].aggregate);
+  EXPECT_NE(later[0].aggregate, -99.0);
+}
+
+TEST_F(MpiEvaluatorTest, FailedRunsOfAllWorkersCountTogether) {
+  MpiEvaluator& master = makeMaster(10);
+  becomeReady(1);
+  becomeReady(2);
+  channel_.onSend = [this](const Message& message) {
+    ResultMessage failed{runner_->failedResult({EvaluationFailure::Kind::exitCode, "code 3", {"last words"}}), "left"};
+    channel_.deliver(message.rank, RankMessage::result, encode(failed));
+  };
+  try {
+    master.evaluateParameterSets(std::vector<ParameterSet>(4, {2.0}), DispatchMode::task);
+    FAIL();
+  } catch (const FatalError& error) {
+    EXPECT_EQ(error.message(), "Error: Unable to continue. No of failed simulations too high.");
+    EXPECT_THAT(error.detail(), HasSubstr("code 3\n| last words"));
+  }
+  EXPECT_EQ(failedRuns_->failedCount(), 2);
+  EXPECT_THAT(observer_.events, Contains("warning: Evaluation of parameter set No. 1: left"));
+}
+
+TEST_F(MpiEvaluatorTest, AWorkersFatalErrorIsTheMastersWithItsPlace) {
+  MpiEvaluator& master = makeMaster();
+  becomeReady(1);
+  becomeReady(2);
+  channel_.deliver(2, RankMessage::failure, encode(FailureMessage{"Error: Unable to open x", "No space left"}));
+  try {
+    master.evaluateParameterSets(std::vector<ParameterSet>{{2.0}}, DispatchMode::task);
+    FAIL();
+  } catch (const FatalError& error) {
+    EXPECT_EQ(error.message(), "Error: Unable to open x");
+    EXPECT_EQ(error.detail(), "No space left\nreported by worker 2 on node");
+  }
+}
+
+TEST_F(MpiEvaluatorTest, ACancelledRunStopsWhileWorkersAreBusy) {
+  MpiEvaluator& master = makeMaster();
+  becomeReady(1);
+  channel_.onReceive = [this](double seconds) {
+    EXPECT_LE(seconds, 3.0);
+    observer_.cancelled = !running_.empty();
+  };
+  EXPECT_THROW(master.evaluateParameterSets(std::vector<ParameterSet>(4, {2.0}), DispatchMode::task), RunCancelled);
+  EXPECT_EQ(observer_.events.back(), "EM: Simulation cancelled");
+}
+
+TEST_F(MpiEvaluatorTest, StoppingGoesInRankOrderAndEndsWithTheLastFarewell) {
+  channel_.onSend = nullptr;
+  channel_.deliver(2, RankMessage::failure, encode(FailureMessage{"too late", {}}));
+  channel_.deliver(2, RankMessage::farewell, {});
+  channel_.deliver(1, RankMessage::farewell, {});
+  EXPECT_TRUE(stopWorkers(channel_, 5.0));
+  ASSERT_EQ(channel_.sent.size(), 2U);
+  EXPECT_EQ(channel_.sent[0].rank, 1);
+  EXPECT_EQ(channel_.sent[1].tag, static_cast<int>(RankMessage::stop));
+  channel_.deliver(1, RankMessage::farewell, {});
+  EXPECT_FALSE(stopWorkers(channel_, 5.0));  // the other one says nothing
+}
+
+}  // namespace
+}  // namespace mirevo

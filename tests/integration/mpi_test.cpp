@@ -1,0 +1,238 @@
+#include <algorithm>
+#include <chrono>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "integration/model_folder.h"
+
+namespace mirevo::testing {
+namespace {
+
+using ::testing::AnyOf;
+using ::testing::HasSubstr;
+using ::testing::Not;
+
+/// Everything in a result file but when it was made.
+std::string withoutDate(const std::string& results) {
+  const auto start = results.find("# Started: ");
+  return start == std::string::npos ? results : results.substr(0, start) + results.substr(results.find('\n', start));
+}
+
+int occurrences(const std::string& text, const std::string& wanted) {
+  int count = 0;
+  for (auto at = text.find(wanted); at != std::string::npos; at = text.find(wanted, at + 1)) ++count;
+  return count;
+}
+
+/// Jobs of the built program on this machine alone, more processes than cores.
+class Mpi : public ::testing::Test {
+ protected:
+  void SetUp() override {
+    if (std::system("mpirun --version >/dev/null 2>&1") != 0) GTEST_SKIP() << "mpirun is not installed";
+  }
+
+  static std::vector<std::string> command(int processes, const std::vector<std::string>& arguments) {
+    std::vector<std::string> words{"--oversubscribe",         "--allow-run-as-root", "--bind-to", "none", "-n",
+                                   std::to_string(processes), MIREVO_PROGRAM};
+    words.insert(words.end(), arguments.begin(), arguments.end());
+    return words;
+  }
+  static RunningProgram::Environment environment() {
+    // Shared memory only. What MPI itself does not release at its end is no fault of the program.
+    return {{"OMPI_MCA_btl", "self,vader"},
+            {"OMPI_MCA_btl_vader_single_copy_mechanism", "none"},
+            {"ASAN_OPTIONS", "detect_leaks=0"}};
+  }
+  static ProgramResult runJob(int processes, const std::vector<std::string>& arguments) {
+    return RunningProgram(command(processes, arguments), environment(), "mpirun").wait();
+  }
+
+  /// The model as a shell script with `lines` before the model proper.
+  void useScript(const std::string& lines) const {
+    folder_.write("model/run.sh", fmt::format("#!/bin/sh\n{}\nexec {} \"$@\"\n", lines, MIREVO_TEST_MODEL));
+  }
+  static std::vector<std::string> scenarios(int count) {
+    std::vector<std::string> values;
+    for (int i = 0; i < count; ++i) values.push_back(fmt::format("{}, {}, 1", 0.45 * i, 0.2 * i));
+    return values;
+  }
+  /// The process folder with that number, relative to the test's; empty when there is none.
+  std::string processFolder(const RunSettings& settings, int number) const {
+    const std::string parent = settings.processFolder.empty() ? "." : settings.processFolder;
+    for (const auto& entry : std::filesystem::directory_iterator(folder_.file(parent))) {
+      const std::string name = entry.path().filename().string();
+      if (name.starts_with("basin") && name.ends_with(fmt::format("_Process{}", number))) return parent + "/" + name;
+    }
+    return {};
+  }
+  std::string log() const { return folder_.read("basin.log"); }
+
+  /// Waits until the file holds a process id, and returns that.
+  int waitForProcess(const std::string& name) const {
+    EXPECT_TRUE(waitUntil([&] { return folder_.has(name) && folder_.read(name).ends_with("\n"); })) << log();
+    return std::atoi(folder_.read(name).c_str());
+  }
+  static void expectGone(int process) {
+    EXPECT_GT(process, 0);
+    EXPECT_TRUE(waitUntil([&] { return !isRunning(process); }, 5.0)) << process;
+  }
+
+  ModelFolder folder_;
+};
+
+TEST_F(Mpi, AJobWritesTheResultsOfAPlainRun) {
+  const struct {
+    RunSettings settings;
+    const char* results;
+    int processes;
+  } cases[] = {
+      {{.maxEvaluations = 25}, "basin_Optimisation.dat", 2},
+      {{.option = 3, .maxEvaluations = 15, .savedFile = "model/simulated.csv"}, "basin.dat", 3},
+      // Two of them fail, which is as many as may.
+      {{.option = 0, .scenarios = scenarios(20), .modelArguments = "--fail-above 8", .processFolder = "scratch/made"},
+       "basin.dat",
+       3},
+  };
+  useScript("env | grep -cE '^(OMPI|PMIX|PMI)_' > job_variables.txt");
+  for (const auto& c : cases) {
+    const std::string setup = folder_.writeSetup(c.settings);
+    ASSERT_EQ(runProgram({setup}).exitCode, 0) << log();
+    const std::string plain = folder_.read(c.results);
+    const ProgramResult job = runJob(c.processes, {setup});
+    EXPECT_EQ(job.exitCode, 0) << job.error << log();
+    EXPECT_EQ(job.output + job.error, "");
+    EXPECT_EQ(withoutDate(folder_.read(c.results)), withoutDate(plain));
+    EXPECT_THAT(log(), HasSubstr(fmt::format("MPI job: this master and {} workers", c.processes - 1)));
+    EXPECT_THAT(log(), ::testing::EndsWith("\n\nNormal termination\n"));
+    for (int rank = 1; rank < c.processes; ++rank) {
+      // A model that uses MPI itself must not take itself for a process of this job.
+      EXPECT_EQ(folder_.read(processFolder(c.settings, rank) + "/job_variables.txt"), "0\n");
+    }
+    EXPECT_EQ(processFolder(c.settings, 0), "");
+    if (!c.settings.savedFile.empty()) {
+      EXPECT_TRUE(folder_.has("basin_Saved/15/simulated.csv"));
+      EXPECT_EQ(folder_.read("basin_Saved/15/simulated.csv"), folder_.read("basin_Saved.1/15/simulated.csv"));
+    }
+    EXPECT_THAT(folder_.read("basin._spi_"), ::testing::EndsWith("PROGRE100.0\n"));
+  }
+}
+
+TEST_F(Mpi, AProcessAloneInItsJobIsAPlainRun) {
+  const ProgramResult job = runJob(1, {folder_.writeSetup({.option = 0, .scenarios = scenarios(4), .slots = 2})});
+  EXPECT_EQ(job.exitCode, 0) << job.error << log();
+  EXPECT_THAT(log(), Not(HasSubstr("MPI")));
+  EXPECT_TRUE(folder_.has("basin_Process2"));
+}
+
+TEST_F(Mpi, AnErrorEndsTheJobWithItsMessageOnce) {
+  struct Case {
+    const char* what;
+    std::string script;
+    RunSettings settings;
+    std::string message;
+    std::string detail;
+  };
+  const std::vector<Case> cases = {
+      {"too many model runs fail",
+       "",
+       {.option = 0, .scenarios = scenarios(8), .modelArguments = "--fail-above -1"},
+       "Error: Unable to continue. No of failed simulations too high.",
+       "run.sh exited with code 3"},
+      // The first run leaves a folder where the second one's worker is to write the parameters.
+      {"a worker cannot write a file",
+       "cp parameters.txt copy; rm -f parameters.txt; mkdir -p parameters.txt/full; set -- --parameters copy",
+       {.option = 0, .scenarios = scenarios(20)},
+       "parameters.txt",
+       "reported by worker "},
+      {"the setup has no model", "", {.option = 0, .batchFile = "model/none.sh"}, "Error: The file ", "none.sh"},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(c.what);
+    useScript(c.script);
+    const ProgramResult job = runJob(3, {folder_.writeSetup(c.settings)});
+    EXPECT_EQ(job.exitCode, 1);
+    EXPECT_FALSE(job.timedOut);
+    EXPECT_THAT(log(), HasSubstr(c.message));
+    EXPECT_THAT(log(), HasSubstr(c.detail));
+    EXPECT_THAT(log(), Not(HasSubstr("Termination request")));
+    EXPECT_EQ(occurrences(job.error, c.message), 1) << job.error;
+  }
+}
+
+TEST_F(Mpi, MissingSetupIsSaidOnce) {
+  const ProgramResult job = runJob(3, {"//qmon"});
+  EXPECT_EQ(job.exitCode, 1);
+  EXPECT_EQ(occurrences(job.error, "Usage: Mirevo kdx-file"), 1) << job.error;
+}
+
+/// A job of three processes in which one worker's model hangs, ignores SIGTERM and has a child that does so, too.
+class HangingMpi : public Mpi {
+ protected:
+  HangingMpi() {
+    useScript(
+        fmt::format("if mkdir '{0}/first' 2>/dev/null; then\n"
+                    "  echo $PPID > '{0}/worker.pid'\n  echo $$ > '{0}/model.pid'\n"
+                    "  exec {1} --sleep-ms 3600000 --ignore-term 1 --grandchild '{0}/grandchild.pid'\n"
+                    "fi",
+                    folder_.path(), MIREVO_TEST_MODEL));
+    setup_ = folder_.writeSetup({.option = 0, .scenarios = scenarios(12)});
+  }
+  /// Once this returns, all sets but one have been evaluated by the other worker.
+  void waitUntilOneIsLeft() {
+    model_ = waitForProcess("model.pid");
+    worker_ = waitForProcess("worker.pid");
+    grandchild_ = waitForProcess("grandchild.pid");
+    EXPECT_TRUE(waitUntil([&] { return occurrences(log(), " completed: OK") == 11; })) << log();
+  }
+  void expectAllGone() {
+    for (const int process : {model_, worker_, grandchild_}) expectGone(process);
+  }
+
+  std::string setup_;
+  int model_ = 0;
+  int worker_ = 0;
+  int grandchild_ = 0;
+};
+
+TEST_F(HangingMpi, AKillFileStopsEveryRankInFiveSeconds) {
+  RunningProgram job(command(3, {setup_}), environment(), "mpirun");
+  waitUntilOneIsLeft();
+  const auto start = std::chrono::steady_clock::now();
+  folder_.write("basin._kill_", "");
+  EXPECT_TRUE(waitUntil([&] { return !isRunning(model_) && !isRunning(grandchild_); }, 10.0));
+  EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(5));
+  const ProgramResult result = job.wait(20.0);
+  EXPECT_EQ(result.exitCode, 1);
+  EXPECT_EQ(occurrences(result.error, "EM: Simulation cancelled"), 1) << result.error;
+  EXPECT_THAT(log(), HasSubstr("EM: Simulation cancelled\n"));
+  EXPECT_THAT(folder_.read("basin.dat"), HasSubstr("# EM: Simulation cancelled\n"));
+  EXPECT_EQ(readResults(folder_.read("basin.dat")).rows.size(), 12U);
+  expectAllGone();
+}
+
+TEST_F(HangingMpi, ATerminatedLauncherLeavesNoProcess) {
+  RunningProgram job(command(3, {setup_}), environment(), "mpirun");
+  waitUntilOneIsLeft();
+  job.send(SIGTERM);
+  const ProgramResult result = job.wait(20.0);
+  EXPECT_FALSE(result.timedOut);
+  EXPECT_NE(result.exitCode, 0);
+  EXPECT_THAT(log(), HasSubstr("\nTermination request\n"));
+  expectAllGone();
+}
+
+TEST_F(HangingMpi, AKilledWorkerEndsTheJob) {
+  RunningProgram job(command(3, {setup_}), environment(), "mpirun");
+  waitUntilOneIsLeft();
+  ::kill(worker_, SIGKILL);
+  const ProgramResult result = job.wait(20.0);
+  EXPECT_FALSE(result.timedOut);
+  EXPECT_NE(result.exitCode, 0);
+  EXPECT_THAT(result.error, HasSubstr("signal 9"));
+  EXPECT_THAT(log(), HasSubstr("\nTermination request\n"));
+  expectAllGone();
+}
+
+}  // namespace
+}  // namespace mirevo::testing
