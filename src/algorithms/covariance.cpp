@@ -8,13 +8,8 @@
 #include <boost/math/distributions/students_t.hpp>
 #include <fmt/format.h>
 
+#include "algorithms/lapack.h"
 #include "algorithms/sample_summary.h"
-
-extern "C" {
-/// LAPACK: Cholesky factor of a symmetric positive definite matrix, and the inverse from the factor.
-void dpotrf_(const char* uplo, const int* n, double* a, const int* lda, int* info);
-void dpotri_(const char* uplo, const int* n, double* a, const int* lda, int* info);
-}
 
 namespace mirevo {
 
@@ -83,6 +78,7 @@ std::vector<double> gramMatrix(const std::vector<std::vector<double>>& columns, 
 std::size_t factorise(std::vector<double>& gram, std::size_t k) {
   const int n = static_cast<int>(k);
   int info = 0;
+  useOneLapackThread();
   dpotrf_("U", &n, gram.data(), &n, &info);
   const std::size_t sound = info > 0 ? static_cast<std::size_t>(info - 1) : k;
   for (std::size_t i = 0; i < sound; ++i) {

@@ -7,12 +7,22 @@ void dpotrf_(const char* uplo, const int* n, double* a, const int* lda, int* inf
 /// Solves a·x = b for `rightSides` columns of b, from the factor of dpotrf.
 void dpotrs_(const char* uplo, const int* n, const int* rightSides, const double* a, const int* lda, double* b,
              const int* ldb, int* info);
+/// The inverse (lower triangle) from the factor of dpotrf, in its place.
+void dpotri_(const char* uplo, const int* n, double* a, const int* lda, int* info);
+/// Of OpenBLAS alone, where LAPACK is its.
+void openblas_set_num_threads(int count) __attribute__((weak));
 }
 
 namespace mirevo {
 
+/// One thread for LAPACK: its results must not depend on how many cores a machine has, and the cores are the model's.
+inline void useOneLapackThread() {
+  if (openblas_set_num_threads != nullptr) openblas_set_num_threads(1);
+}
+
 /// Replaces the symmetric matrix (n·n entries) by its lower Cholesky factor; false when it is not positive definite.
 inline bool choleskyFactor(double* matrix, int n) {
+  useOneLapackThread();
   int info = 0;
   dpotrf_("L", &n, matrix, &n, &info);
   return info == 0;
