@@ -1,0 +1,174 @@
+/// Prints the tables of docs/algorithms/search-comparison.md. Usage: search_comparison [table], where the table is
+/// "success", "budget" or "surrogate"; all of them without an argument. Every trial has its own seed, 1, 2, 3, ..., so
+/// that the figures are the same on every run.
+
+#include <algorithm>
+#include <functional>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include <fmt/format.h>
+
+#include "algorithms/dds.h"
+#include "algorithms/proposal_selector.h"
+#include "algorithms/pse.h"
+#include "algorithms/sce.h"
+#include "algorithms/test_functions.h"
+
+namespace mirevo {
+namespace {
+
+using testing::TargetEvaluator;
+using testing::TestFunction;
+
+constexpr int kTrials = 100;
+constexpr int kSurrogateTrials = 20;
+constexpr int kSuccessBudget = 25000;
+constexpr int kSurrogateBudget = 2000;
+
+enum class Method { sce, pse, dds };
+
+struct Setting {
+  Method method = Method::sce;
+  int complexes = 2;  ///< the population is as many times 2n + 1 points, for PSE too
+  int budget = kSuccessBudget;
+  int samplingRate = 100;  ///< below 100 with the surrogate model
+  int modelType = 0;
+  bool stopsAtTarget = false;
+};
+
+struct Outcome {
+  bool isSuccess = false;
+  int evaluations = 0;  ///< to the first value within the tolerance of the optimum
+  double best = 0.0;
+};
+
+Outcome runTrial(const TestFunction& function, const Setting& setting, int seed) {
+  TargetEvaluator evaluator(function);
+  UniformGenerator random(seed);
+  const SearchBounds bounds = testing::boundsOf(function);
+  const int n = static_cast<int>(function.size());
+  const SurrogateSettings surrogate{setting.samplingRate, (n + 1) * (n + 2), setting.modelType, 2};
+  ProposalSelector selector(surrogate, bounds);
+  // The test of the objective's change is switched off by a history that is never filled.
+  const StoppingCriteria stopping{setting.budget, 1000000000, 0.0};
+  const SearchProblem problem{bounds,
+                              stopping,
+                              InitialSampleSettings{false, 1, ""},
+                              {},
+                              evaluator,
+                              random,
+                              setting.samplingRate < 100 ? &selector : nullptr};
+  std::unique_ptr<SearchAlgorithm> search;
+  if (setting.method == Method::sce) {
+    search =
+        std::make_unique<Sce>(SceSettings{setting.complexes, 2 * n + 1, 2 * n + 1}, SimplexSettings{n + 1}, problem);
+  } else if (setting.method == Method::pse) {
+    search = std::make_unique<Pse>(PseSettings{setting.complexes * (2 * n + 1)}, SimplexSettings{n + 1}, problem);
+  } else {
+    search = std::make_unique<Dds>(DdsSettings{}, setting.budget, false, bounds, evaluator, random);
+  }
+  if (search->initialise() != kSearchOk) return {};
+  while (!search->isTerminated() && !(setting.stopsAtTarget && evaluator.hasHitTarget())) {
+    if (search->advance() != kSearchOk) return {};
+  }
+  return {evaluator.hasHitTarget(), evaluator.evaluationsToTarget, search->summary().bestResult.aggregate};
+}
+
+std::vector<Outcome> runTrials(const TestFunction& function, Setting setting, bool isShifted, int trials) {
+  std::vector<Outcome> outcomes;
+  for (int seed = 1; seed <= trials; ++seed) {
+    outcomes.push_back(runTrial(isShifted ? testing::shifted(function, seed) : function, setting, seed));
+  }
+  return outcomes;
+}
+
+/// "successes/mean evaluations of the successful trials".
+std::string successText(const std::vector<Outcome>& outcomes) {
+  int successes = 0;
+  double sum = 0.0;
+  for (const Outcome& outcome : outcomes) {
+    if (!outcome.isSuccess) continue;
+    ++successes;
+    sum += outcome.evaluations;
+  }
+  return successes == 0 ? "0/–" : fmt::format("{}/{:.0f}", successes, sum / successes);
+}
+
+std::string meanAndMedianText(const std::vector<Outcome>& outcomes) {
+  std::vector<double> values;
+  double sum = 0.0;
+  for (const Outcome& outcome : outcomes) {
+    values.push_back(outcome.best);
+    sum += outcome.best;
+  }
+  std::sort(values.begin(), values.end());
+  const double median = 0.5 * (values[(values.size() - 1) / 2] + values[values.size() / 2]);
+  return fmt::format("{:.3g} / {:.3g}", sum / static_cast<double>(values.size()), median);
+}
+
+void printSuccess() {
+  for (const bool isShifted : {false, true}) {
+    fmt::print("\nSuccesses of {} / mean evaluations of the successful, {} optimum\n\n", kTrials,
+               isShifted ? "shifted" : "centred");
+    fmt::print("| function | SCE 2 | SCE 4 | SCE 8 | PSE 2 | PSE 4 | PSE 8 |\n|---|---|---|---|---|---|---|\n");
+    for (const TestFunction& function : testing::testFunctions()) {
+      if (function.name == "Rastrigin 10-D" || function.name == "Rosenbrock 10-D") continue;
+      fmt::print("| {} |", function.name);
+      for (const Method method : {Method::sce, Method::pse}) {
+        for (const int complexes : {2, 4, 8}) {
+          const Setting setting{.method = method, .complexes = complexes, .stopsAtTarget = true};
+          fmt::print(" {} |", successText(runTrials(function, setting, isShifted, kTrials)));
+        }
+      }
+      fmt::print("\n");
+    }
+  }
+}
+
+void printBudget() {
+  fmt::print("\nMean / median best value over {} trials, centred optimum\n\n", kTrials);
+  fmt::print("| function | DDS 1000 | SCE 1000 | PSE 1000 | SCE 5000 | PSE 5000 |\n|---|---|---|---|---|---|\n");
+  for (const std::string name : {"Griewank 10-D", "Ackley 10-D", "Rastrigin 10-D", "Rosenbrock 10-D", "Hartman 6-D"}) {
+    const TestFunction function = testing::testFunction(name);
+    fmt::print("| {} |", name);
+    for (const Setting& setting :
+         {Setting{.method = Method::dds, .budget = 1000}, Setting{.complexes = 2, .budget = 1000},
+          Setting{.method = Method::pse, .complexes = 2, .budget = 1000}, Setting{.complexes = 5, .budget = 5000},
+          Setting{.method = Method::pse, .complexes = 5, .budget = 5000}}) {
+      fmt::print(" {} |", meanAndMedianText(runTrials(function, setting, false, kTrials)));
+    }
+    fmt::print("\n");
+  }
+}
+
+void printSurrogate() {
+  fmt::print("\nSuccesses of {} / mean evaluations of the successful, shifted optimum, 4 complexes\n\n",
+             kSurrogateTrials);
+  fmt::print("| function | search | alone | quadratic 50 % | quadratic 25 % | Gaussian 50 % | Gaussian 25 % |\n");
+  fmt::print("|---|---|---|---|---|---|---|\n");
+  for (const std::string name :
+       {"Goldstein-Price 2-D", "Rosenbrock 2-D", "Six-hump camel-back 2-D", "Shekel 4-D", "Hartman 6-D"}) {
+    const TestFunction function = testing::testFunction(name);
+    for (const Method method : {Method::sce, Method::pse}) {
+      fmt::print("| {} | {} |", name, method == Method::sce ? "SCE" : "PSE");
+      for (const auto& [rate, model] : {std::pair{100, 0}, {50, 0}, {25, 0}, {50, 1}, {25, 1}}) {
+        const Setting setting{method, 4, kSurrogateBudget, rate, model, true};
+        fmt::print(" {} |", successText(runTrials(function, setting, true, kSurrogateTrials)));
+      }
+      fmt::print("\n");
+    }
+  }
+}
+
+}  // namespace
+}  // namespace mirevo
+
+int main(int argc, char** argv) {
+  const std::string table = argc > 1 ? argv[1] : "";
+  if (table.empty() || table == "success") mirevo::printSuccess();
+  if (table.empty() || table == "budget") mirevo::printBudget();
+  if (table.empty() || table == "surrogate") mirevo::printSurrogate();
+  return 0;
+}

@@ -1,0 +1,89 @@
+#include "algorithms/surrogate_model.h"
+
+#include <cmath>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "algorithms/gaussian_process.h"
+#include "algorithms/latin_hypercube.h"
+#include "algorithms/proposal_selector.h"
+#include "algorithms/quadratic_surrogate.h"
+
+namespace mirevo {
+namespace {
+
+using Function = double (*)(const std::vector<double>&);
+
+std::vector<double> valuesOf(const UnitPoints& points, Function function) {
+  std::vector<double> values;
+  for (const auto& point : points) values.push_back(function(point));
+  return values;
+}
+
+double quadratic(const std::vector<double>& x) {
+  return 3.0 + x[0] - 2.0 * x[1] * x[2] + 5.0 * x[2] * x[2];
+}
+double wave(const std::vector<double>& x) {
+  return std::sin(5.0 * x[0]) + 0.01 * x[1];
+}
+
+TEST(QuadraticSurrogate, ReproducesAQuadraticPolynomial) {
+  UniformGenerator random(1);
+  const UnitPoints points = latinHypercube(30, 3, random);
+  QuadraticSurrogate model;
+  ASSERT_TRUE(model.fit(points, valuesOf(points, quadratic)));
+  for (const auto& point : latinHypercube(10, 3, random)) EXPECT_NEAR(model.predict(point), quadratic(point), 1.0e-5);
+}
+
+TEST(QuadraticSurrogate, StaysFiniteWhereThePointsDoNotDetermineIt) {
+  QuadraticSurrogate model;
+  EXPECT_FALSE(model.fit({}, {}));
+  const UnitPoints same(4, {0.5, 0.5});
+  ASSERT_TRUE(model.fit(same, std::vector<double>{1, 1, 1, 1}));
+  EXPECT_NEAR(model.predict(std::vector<double>{0.7, 0.2}), 1.0, 1.0e-6);
+  const UnitPoints line{{0.0, 0.3}, {0.5, 0.3}, {1.0, 0.3}};
+  ASSERT_TRUE(model.fit(line, std::vector<double>{0, 1, 2}));
+  EXPECT_NEAR(model.predict(line[1]), 1.0, 1.0e-3);
+}
+
+TEST(GaussianProcess, LearnsAWaveAndThatACoordinateHardlyMatters) {
+  UniformGenerator random(2);
+  const UnitPoints points = latinHypercube(40, 2, random);
+  GaussianProcess model;
+  ASSERT_TRUE(model.fit(points, valuesOf(points, wave)));
+  for (const auto& point : latinHypercube(10, 2, random)) EXPECT_NEAR(model.predict(point), wave(point), 0.02);
+  EXPECT_GT(model.lengths()[1], 3.0 * model.lengths()[0]);
+}
+
+TEST(GaussianProcess, RefusesOrSurvivesDegeneratePoints) {
+  GaussianProcess model;
+  EXPECT_FALSE(model.fit(UnitPoints(1, {0.5}), std::vector<double>{1}));
+  EXPECT_FALSE(model.fit(UnitPoints{{0.1}, {0.9}}, std::vector<double>{1, 1}));  // constant: nothing to learn
+  const UnitPoints twins{{0.1}, {0.1}, {0.9}, {0.5}};
+  ASSERT_TRUE(model.fit(twins, std::vector<double>{1, 1.1, 3, 2}));
+  EXPECT_TRUE(std::isfinite(model.predict(std::vector<double>{0.3})));
+}
+
+TEST(ProposalSelector, RanksByPredictionAndLeavesFailuresOut) {
+  const SearchBounds bounds{{-10}, {10}, {0}};
+  for (const int type : {0, 1}) {
+    ProposalSelector selector({40, 100, type, 2}, bounds);
+    EXPECT_EQ(selector.proposalsPerRun(), 3U);
+    for (int i = -5; i <= 5; ++i) {
+      EvaluationResult result;
+      result.aggregate = (i - 2.0) * (i - 2.0);
+      if (i == 2) result.failure.emplace();
+      if (i == 2) result.aggregate = kFailedRunValue;
+      selector.note({static_cast<double>(i)}, result);
+    }
+    EXPECT_FALSE(selector.isActive(1));
+    EXPECT_TRUE(selector.isActive(2));
+    const std::vector<ParameterSet> proposals{{-4}, {2}, {0}, {3}, {7}};
+    EXPECT_THAT(selector.select(proposals, 2), testing::ElementsAre(1, 3)) << type;
+    EXPECT_THAT(selector.select(proposals, 9), testing::ElementsAre(0, 1, 2, 3, 4)) << type;
+  }
+}
+
+}  // namespace
+}  // namespace mirevo
