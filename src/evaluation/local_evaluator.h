@@ -11,8 +11,8 @@
 
 namespace mirevo {
 
-/// Longest time between two looks at the running batches and at the cancellation; a batch that ends ends the wait. Short
-/// enough for a cancelled run to be over within 3 seconds, the grace time of models that ignore SIGTERM included.
+/// Longest time between two looks at the running batches and at the cancellation; a batch that ends ends the wait.
+/// Short enough for a cancelled run to be over within 3 seconds, the grace time of models that ignore SIGTERM included.
 inline constexpr double kPollSeconds = 0.5;
 
 /// Runs the model in local slots, several at once.

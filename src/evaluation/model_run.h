@@ -29,7 +29,7 @@ struct ModelDescription {
   std::vector<ObjectiveFunction> objectives;
   std::vector<std::string> savedFiles;  ///< kept of every model run
   std::string savedFolder;              ///< where they are kept
-  bool keepSimulatedValues = false;  ///< results hold the simulated values at the observation times
+  bool keepSimulatedValues = false;     ///< results hold the simulated values at the observation times
 };
 
 /// Model runs in slots: writes the input, starts the batch, and turns what it wrote into a result. Used by the local
