@@ -15,7 +15,7 @@ constexpr std::uint64_t kDimensions = 10;
 constexpr std::uint64_t kVariables = 11;
 constexpr std::uint64_t kAttributes = 12;
 
-/// Walks through the header, whose numbers are big-endian, as "The NetCDF Classic Format Specification" lays it out.
+/// Walks through the header, whose numbers are big-endian, as the classic file format lays it out.
 /// Sizes are doubles: exact for every file there is, and without overflow for a damaged header.
 class ClassicHeader final {
  public:

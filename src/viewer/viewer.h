@@ -49,7 +49,7 @@ class Viewer final {
   SignalQueue signals_;
   std::unique_ptr<Display> display_;
   std::vector<std::string> newMessages_;
-  std::string runOutput_;  ///< of the started run, its end when it is long
+  std::string runOutput_;     ///< of the started run, its end when it is long
   bool hasCaughtUp_ = false;  ///< with what the file held when the viewer began; nothing is shown before
   bool hasMore_ = false;
   bool keysEnded_ = false;
