@@ -5,8 +5,8 @@
 
 namespace mirevo {
 
-/// Shows a message to the user, under a title where one is given. It goes to standard error with either value of `G48`:
-/// this version has no progress viewer of its own, and nothing in an unattended run may wait for a person.
+/// Shows a message to the user, under a title where one is given. It goes to standard error with either value of `G48`,
+/// which under `//qmon` is the viewer's: nothing in an unattended run may wait for a person.
 void showMessage(std::string_view text, std::string_view title = {});
 
 /// Ends the process with the exit code, whichever front end is active.
