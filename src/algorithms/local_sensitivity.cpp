@@ -155,6 +155,12 @@ PerturbationPlan planPerturbations(const SensitivitySettings& settings, const Se
   return plan;
 }
 
+bool hasRoomForStep(const SensitivitySettings& settings, const SearchSpace& space, std::size_t j) {
+  constexpr double kRounding = 1.0 + 1.0e-12;
+  const Step step = wantedStep(settings, space, space.initial, j);
+  return step.up <= step.roomUp * kRounding || step.down <= step.roomDown * kRounding;
+}
+
 LocalSensitivity localSensitivity(const SensitivitySettings& settings, const SearchSpace& space, Evaluator& evaluator) {
   LocalSensitivity sensitivity;
   sensitivity.plan = planPerturbations(settings, space, space.initial);

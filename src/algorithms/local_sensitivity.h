@@ -35,6 +35,9 @@ struct PerturbationPlan {
 PerturbationPlan planPerturbations(const SensitivitySettings& settings, const SearchSpace& space,
                                    std::span<const double> base);
 
+/// Whether parameter j has room for its whole step, one way at least, from the space's initial value.
+bool hasRoomForStep(const SensitivitySettings& settings, const SearchSpace& space, std::size_t j);
+
 /// Derivatives of m outputs by p parameters, and what follows from them.
 struct SensitivityTable {
   std::vector<double> base;                      ///< the outputs of the base set, m

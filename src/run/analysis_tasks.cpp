@@ -118,7 +118,7 @@ std::vector<std::string> reportCovariance(const TaskContext& context, const Loca
 std::vector<std::string> runUncertainty(const TaskContext& context) {
   const UncertaintyOutcome outcome =
       uncertaintyAnalysis(context.config.uncertainty, context.config.randomSeed, context.evaluator,
-                          [&context](std::string_view text) { context.log.warning(text); });
+                          [&context](std::string_view text) { context.log.line(text); });
   std::vector<std::string> report = formatUncertainty(summariseUncertainty(outcome), analysisNames(context));
   logReport(context, report);
   const std::vector<std::string> bands = reportBands(context, outcome.results);

@@ -5,9 +5,11 @@
 
 #include <fmt/format.h>
 
+#include "algorithms/local_sensitivity.h"
 #include "common/fatal_error.h"
 #include "common/text.h"
 #include "measures/dates.h"
+#include "parameters/search_space.h"
 
 namespace mirevo {
 namespace {
@@ -164,19 +166,19 @@ void validateLocalSensitivity(const SensitivityConfig& sensitivity, std::span<co
                 "Error: Perturbation option in local sensitivity analysis invalid");
   section.check("Perturbation_Fraction", sensitivity.local.perturbationFraction,
                 "Error: Perturbation fraction in local sensitivity analysis invalid");
+  const SearchSpace space = BuildSearchSpace(parameters);
+  std::size_t j = 0;
   for (const ModelParameter& parameter : parameters) {
-    if (!isVariable(parameter)) continue;
-    const double base = sensitivity.local.perturbationOption == 0 ? parameter.upperBound - parameter.lowerBound
-                                                                  : std::abs(parameter.initialValue);
-    const double step = sensitivity.local.perturbationFraction * base;
     // A perturbation that would leave the range is taken the other way, so that both must fail.
-    if (parameter.initialValue + step <= parameter.upperBound || parameter.initialValue - step >= parameter.lowerBound)
-      continue;
+    if (!isVariable(parameter) || hasRoomForStep(sensitivity.local, space, j++)) continue;
     section.refuse(fmt::format("Error: Perturbed value for parameter {} in local sensitivity analysis out of bounds",
                                parameter.name),
                    "Perturbation_Fraction",
-                   fmt::format("a step of {} from {} leaves the bounds {} to {} both ways", step,
-                               parameter.initialValue, parameter.lowerBound, parameter.upperBound));
+                   fmt::format("{} of the {}, from {}, leaves the bounds {} to {} both ways{}",
+                               sensitivity.local.perturbationFraction,
+                               sensitivity.local.perturbationOption == 0 ? "range" : "value", parameter.initialValue,
+                               parameter.lowerBound, parameter.upperBound,
+                               parameter.transformationType == TransformationType::logarithmic ? " (logarithms)" : ""));
   }
 }
 

@@ -168,7 +168,7 @@ const std::vector<Refused>& refusedValues() {
        "expected greater than 0 and at most 1, found 0"},
       {{kSensitivity, {"Perturbation_Fraction = 0.02", "Perturbation_Fraction = 0.75"}},
        "Error: Perturbed value for parameter Depth in local sensitivity analysis out of bounds",
-       "a step of 600 from 412.5 leaves the bounds 100 to 900 both ways"},
+       "0.75 of the range, from 412.5, leaves the bounds 100 to 900 both ways (logarithms)"},
       {{{"Algorithm_Type = 1", "Algorithm_Type = 3"}}, "Error: Invalid optimisation algorithm type selection", ""},
       {{{"Upper_Bound = 1.0", "Upper_Bound = 0.31"}, {"Lower_Bound = 0.0", "Lower_Bound = 0.31"}},
        "Error: Lower bound equal to upper bound for parameter Rate",
