@@ -87,7 +87,8 @@ void GaussianProcess::startSearch(std::size_t n, std::span<const double> spread)
 void GaussianProcess::search() {
   const std::size_t n = parameters_.size() - 1;
   double best = solve(parameters_);
-  for (double step = kFirstStep; step >= kLastStep; step /= 2.0) {
+  double step = kFirstStep;
+  while (step >= kLastStep) {
     for (std::size_t k = 0; k <= n; ++k) {
       for (const double move : {step, -step}) {
         Hyperparameters trial = parameters_;
@@ -100,6 +101,7 @@ void GaussianProcess::search() {
         break;
       }
     }
+    step /= 2.0;
   }
 }
 

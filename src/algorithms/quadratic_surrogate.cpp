@@ -44,9 +44,11 @@ bool QuadraticSurrogate::fit(std::span<const std::vector<double>> points, std::s
     }
   }
   // The ridge grows until the matrix is positive definite in floating point.
-  for (double ridge = 1.0e-8 * count; ridge <= count; ridge *= 100.0) {
+  double ridge = 1.0e-8 * count;
+  while (ridge <= count) {
     std::vector<double> factor = normal;
     for (std::size_t k = 1; k < size; ++k) factor[k * size + k] += ridge;
+    ridge *= 100.0;
     if (!choleskyFactor(factor.data(), static_cast<int>(size))) continue;
     coefficients_ = moments;
     choleskySolve(factor.data(), static_cast<int>(size), coefficients_.data());

@@ -148,6 +148,8 @@ void MpiSession::start() {
                          *launched, code == MPI_SUCCESS ? "" : ": " + errorText(code)));
 }
 
+// Traffic::complete() tests the request until it is done, which the checker does not see.
+// NOLINTBEGIN(clang-analyzer-optin.mpi.MPI-Checker)
 void MpiSession::send(int rank, int tag, std::string content) {
   traffic_->complete();
   Traffic::Send& send = traffic_->running.emplace_back();
@@ -157,6 +159,7 @@ void MpiSession::send(int rank, int tag, std::string content) {
         "MPI_Isend");
   traffic_->lastMessage = Clock::now();
 }
+// NOLINTEND(clang-analyzer-optin.mpi.MPI-Checker)
 
 std::optional<Message> MpiSession::receive(double seconds) {
   const Clock::time_point start = Clock::now();
@@ -197,7 +200,7 @@ void MpiSession::finalise(double seconds) {
   rank_ = -1;
 }
 
-void MpiSession::abort(int exitCode) {
+void MpiSession::abort(int exitCode) const {
   if (inUse()) MPI_Abort(MPI_COMM_WORLD, exitCode);
   ::_exit(exitCode);
 }

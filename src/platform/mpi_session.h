@@ -32,7 +32,7 @@ class MpiSession final : public MessageChannel {
   void finalise(double seconds);
 
   /// Ends every process of the job at once: the way out when one of them does not answer.
-  [[noreturn]] void abort(int exitCode);
+  [[noreturn]] void abort(int exitCode) const;
 
  private:
   struct Traffic;
