@@ -12,7 +12,7 @@
 namespace mirevo {
 
 /// A folder of its own for one test, removed at its end.
-class TemporaryFolder final {
+class TemporaryFolder {
  public:
   TemporaryFolder() {
     std::string name = (std::filesystem::temp_directory_path() / "mirevo_test_XXXXXX").string();
@@ -33,13 +33,15 @@ class TemporaryFolder final {
   std::string write(const std::string& name, const std::string& content, unsigned mode = 0644) const {
     const std::string path = *this / name;
     std::filesystem::create_directories(std::filesystem::path(path).parent_path());
-    std::ofstream(path) << content;
+    std::ofstream(path, std::ios::binary) << content;
     ::chmod(path.c_str(), mode);
     return path;
   }
 
+  /// The content of a file, "<no file>" when there is none.
   std::string read(const std::string& name) const {
-    std::ifstream file(*this / name);
+    std::ifstream file(*this / name, std::ios::binary);
+    if (!file) return "<no file>";
     std::ostringstream content;
     content << file.rdbuf();
     return content.str();

@@ -104,7 +104,7 @@ exec awk '
   replaceInSetup(folder, "Initial_Value = 4.0", "Initial_Value = 2.3894212918E+02");
   replaceInSetup(folder, "Upper_Bound = 10.0", "Upper_Bound = 1000.0");
   replaceInSetup(folder, "Initial_Value = 1.0", "Initial_Value = 5.5015643181E-04");
-  const ProgramResult run = runProgram({folder.file("basin.kdx")});
+  const ProgramResult run = runProgram({(folder / "basin.kdx")});
   ASSERT_EQ(run.exitCode, 0) << run.error;
   const ResultTable results = readResults(folder.read("basin_Sensitivity.dat"));
   const auto b1 = reportRow(results, "Parameter (model scale)", "a");
@@ -187,7 +187,7 @@ TEST(Scenarios, ASetOfWrongLengthOrOutOfBoundsIsRefusedByItsName) {
     EXPECT_EQ(run.exitCode, 1) << c.values;
     EXPECT_THAT(run.error, StartsWith(c.message));
     EXPECT_THAT(run.error, HasSubstr("basin.kdx:"));
-    EXPECT_FALSE(folder.has("basin.dat"));
+    EXPECT_FALSE(folder.exists("basin.dat"));
   }
 }
 

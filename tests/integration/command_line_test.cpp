@@ -28,20 +28,20 @@ TEST(CommandLine, QuestionsAboutTheProgramAreAnswered) {
 
 TEST(CommandLine, AMissingSetupFileIsNamedOnStandardErrorAndInTheLog) {
   const TemporaryFolder folder;
-  const ProgramResult result = runProgram({"ignored.kdx", folder.file("basin.kdx")});
+  const ProgramResult result = runProgram({"ignored.kdx", (folder / "basin.kdx")});
   EXPECT_EQ(result.exitCode, 1);
-  EXPECT_THAT(result.error, StartsWith("Error: Unable to open " + folder.file("basin.kdx")));
-  EXPECT_THAT(folder.read("basin.log"), HasSubstr("\n\nError: Unable to open " + folder.file("basin.kdx")));
+  EXPECT_THAT(result.error, StartsWith("Error: Unable to open " + (folder / "basin.kdx")));
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("\n\nError: Unable to open " + (folder / "basin.kdx")));
   EXPECT_THAT(folder.read("basin.log"), HasSubstr("No such file or directory"));
-  EXPECT_FALSE(folder.has("basin.dat"));
+  EXPECT_FALSE(folder.exists("basin.dat"));
 
-  ASSERT_EQ(::mkfifo(folder.file("pipe").c_str(), 0600), 0);
-  EXPECT_EQ(runProgram({folder.file("pipe")}).error,
-            "Error: Unable to open " + folder.file("pipe") + "\nNot a regular file\n");
+  ASSERT_EQ(::mkfifo((folder / "pipe").c_str(), 0600), 0);
+  EXPECT_EQ(runProgram({(folder / "pipe")}).error,
+            "Error: Unable to open " + (folder / "pipe") + "\nNot a regular file\n");
 
-  const ProgramResult nowhere = runProgram({folder.file("no/such/folder/basin.kdx")});
+  const ProgramResult nowhere = runProgram({(folder / "no/such/folder/basin.kdx")});
   EXPECT_EQ(nowhere.exitCode, 1);
-  EXPECT_THAT(nowhere.error, HasSubstr(folder.file("no/such/folder/basin")));
+  EXPECT_THAT(nowhere.error, HasSubstr((folder / "no/such/folder/basin")));
 }
 
 TEST(CommandLine, AJobWhoseLauncherIsOfAnotherMpiIsRefusedBeforeAnyFileIsTouched) {
@@ -50,7 +50,7 @@ TEST(CommandLine, AJobWhoseLauncherIsOfAnotherMpiIsRefusedBeforeAnyFileIsTouched
     const ProgramResult result = runProgram({folder.writeSetup({})}, {{variable, "4"}});
     EXPECT_EQ(result.exitCode, 1);
     EXPECT_THAT(result.error, HasSubstr("started 4 processes"));
-    EXPECT_FALSE(folder.has("basin.log"));
+    EXPECT_FALSE(folder.exists("basin.log"));
   }
 }
 

@@ -29,7 +29,7 @@ class Interruption : public ::testing::Test {
   /// Waits until a file with a process id is there, and returns that.
   int waitForProcess(const std::string& name) {
     const std::string file = "basin_Process1/" + name;
-    EXPECT_TRUE(waitUntil([&] { return folder_.has(file) && folder_.read(file).ends_with("\n"); }))
+    EXPECT_TRUE(waitUntil([&] { return folder_.exists(file) && folder_.read(file).ends_with("\n"); }))
         << folder_.read("basin.log");
     return std::atoi(folder_.read(file).c_str());
   }
@@ -84,7 +84,7 @@ TEST_F(Interruption, ASignalEndsTheRunWithItsMessageAndNothingIsLeft) {
     EXPECT_THAT(folder_.read("basin.log"), EndsWith(std::string(message) + "\n"));
     expectFirstRowIsThere();
     expectGone(grandchild);
-    std::filesystem::remove_all(folder_.file("basin_Process1"));
+    std::filesystem::remove_all((folder_ / "basin_Process1"));
   }
 }
 
@@ -105,7 +105,7 @@ TEST_F(Interruption, ASetupThatIsBeingRunIsNotRunASecondTime) {
   EXPECT_EQ(second.exitCode, 1);
   EXPECT_THAT(second.error, HasSubstr("Error: Another run of this setup is in progress"));
   EXPECT_EQ(folder_.read("basin.log"), log);
-  EXPECT_FALSE(folder_.has("basin.1.log"));
+  EXPECT_FALSE(folder_.exists("basin.1.log"));
   program.send(SIGTERM);
   EXPECT_EQ(program.wait(5.0).exitCode, 143);
 }

@@ -32,13 +32,12 @@ struct RunSettings {
 class ModelFolder : public TemporaryFolder {
  public:
   ModelFolder() {
-    write("model/run.sh", fmt::format("#!/bin/sh\nexec {} \"$@\"\n", MIREVO_TEST_MODEL));
-    ::chmod(file("model/run.sh").c_str(), 0755);
+    write("model/run.sh", fmt::format("#!/bin/sh\nexec {} \"$@\"\n", MIREVO_TEST_MODEL), 0755);
     write("model/parameters.txt", "a = 5\nb = 2\nc = 1\n");
     useTemplate("");
     const std::string command = fmt::format("cd '{}/model' && ./run.sh && cp simulated.csv ..", path());
     if (std::system(command.c_str()) != 0) throw std::runtime_error("the test model does not run");
-    std::filesystem::rename(file("simulated.csv"), file("observed.csv"));
+    std::filesystem::rename(*this / "simulated.csv", *this / "observed.csv");
   }
 
   /// The parameter file with further lines.
@@ -47,10 +46,7 @@ class ModelFolder : public TemporaryFolder {
   }
 
   /// Writes `basin.kdx` and returns its path.
-  std::string writeSetup(const RunSettings& settings) const {
-    write("basin.kdx", setupText(settings));
-    return file("basin.kdx");
-  }
+  std::string writeSetup(const RunSettings& settings) const { return write("basin.kdx", setupText(settings)); }
 
  private:
   static std::string scenarioText(const RunSettings& settings) {

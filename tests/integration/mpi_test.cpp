@@ -60,7 +60,7 @@ class Mpi : public ::testing::Test {
   /// The process folder with that number, relative to the test's; empty when there is none.
   std::string processFolder(const RunSettings& settings, int number) const {
     const std::string parent = settings.processFolder.empty() ? "." : settings.processFolder;
-    for (const auto& entry : std::filesystem::directory_iterator(folder_.file(parent))) {
+    for (const auto& entry : std::filesystem::directory_iterator((folder_ / parent))) {
       const std::string name = entry.path().filename().string();
       if (name.starts_with("basin") && name.ends_with(fmt::format("_Process{}", number))) return parent + "/" + name;
     }
@@ -70,7 +70,7 @@ class Mpi : public ::testing::Test {
 
   /// Waits until the file holds a process id, and returns that.
   int waitForProcess(const std::string& name) const {
-    EXPECT_TRUE(waitUntil([&] { return folder_.has(name) && folder_.read(name).ends_with("\n"); })) << log();
+    EXPECT_TRUE(waitUntil([&] { return folder_.exists(name) && folder_.read(name).ends_with("\n"); })) << log();
     return std::atoi(folder_.read(name).c_str());
   }
   static void expectGone(int process) {
@@ -111,7 +111,7 @@ TEST_F(Mpi, AJobWritesTheResultsOfAPlainRun) {
     }
     EXPECT_EQ(processFolder(c.settings, 0), "");
     if (!c.settings.savedFile.empty()) {
-      EXPECT_TRUE(folder_.has("basin_Saved/15/simulated.csv"));
+      EXPECT_TRUE(folder_.exists("basin_Saved/15/simulated.csv"));
       EXPECT_EQ(folder_.read("basin_Saved/15/simulated.csv"), folder_.read("basin_Saved.1/15/simulated.csv"));
     }
     EXPECT_THAT(folder_.read("basin._spi_"), ::testing::EndsWith("PROGRE100.0\n"));
@@ -122,7 +122,7 @@ TEST_F(Mpi, AProcessAloneInItsJobIsAPlainRun) {
   const ProgramResult job = runJob(1, {folder_.writeSetup({.option = 0, .scenarios = scenarios(4), .slots = 2})});
   EXPECT_EQ(job.exitCode, 0) << job.error << log();
   EXPECT_THAT(log(), Not(HasSubstr("MPI")));
-  EXPECT_TRUE(folder_.has("basin_Process2"));
+  EXPECT_TRUE(folder_.exists("basin_Process2"));
 }
 
 TEST_F(Mpi, AnErrorEndsTheJobWithItsMessageOnce) {

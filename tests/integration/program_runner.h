@@ -14,7 +14,7 @@
 #include <unistd.h>
 #include <vector>
 
-#include "run/temporary_folder.h"
+#include "temporary_folder.h"
 
 namespace mirevo::testing {
 
@@ -36,8 +36,8 @@ class RunningProgram {
                           const char* program = MIREVO_PROGRAM) {
     process_ = ::fork();
     if (process_ != 0) return;
-    ::dup2(::open(outputs_.file("out").c_str(), O_WRONLY | O_CREAT, 0666), STDOUT_FILENO);
-    ::dup2(::open(outputs_.file("err").c_str(), O_WRONLY | O_CREAT, 0666), STDERR_FILENO);
+    ::dup2(::open((outputs_ / "out").c_str(), O_WRONLY | O_CREAT, 0666), STDOUT_FILENO);
+    ::dup2(::open((outputs_ / "err").c_str(), O_WRONLY | O_CREAT, 0666), STDERR_FILENO);
     for (const char* name : {"G48", "BUILDMODE", "VOLK_PROGRESS"}) ::unsetenv(name);
     for (const auto& [name, value] : environment) ::setenv(name.c_str(), value.c_str(), 1);
     std::vector<char*> argv{const_cast<char*>(program)};

@@ -48,7 +48,7 @@ TEST(Optimisation, ACalibrationEndsWithItsBestSetInLogResultsAndModelFolder) {
   EXPECT_THAT(log, HasSubstr("   a = " + table.rows.back()[2] + "\n"));
   EXPECT_THAT(log, EndsWith("\n\nNormal termination\n"));
   EXPECT_THAT(folder.read("basin._spi_"), EndsWith("PROGRE100.0\n"));
-  EXPECT_FALSE(folder.has("calSimErr.dat"));
+  EXPECT_FALSE(folder.exists("calSimErr.dat"));
   EXPECT_NEAR(number(folder.read("basin_Process1/parameters.txt").substr(4)), number(table.rows.back()[2]), 1e-6);
 }
 
@@ -115,7 +115,7 @@ TEST(Scenarios, RunsThatEndInAnotherOrderStandInTheirOwnInTheResults) {
     EXPECT_EQ(table.rows[i][0], std::to_string(i));
     EXPECT_EQ(table.rows[i][2], std::to_string(i));
   }
-  EXPECT_FALSE(folder.has("basin._spi_"));
+  EXPECT_FALSE(folder.exists("basin._spi_"));
 }
 
 TEST(Uncertainty, TheSampleIsTheSameWithOneSlotAndWithThree) {
@@ -151,8 +151,8 @@ TEST(SavedOutput, EveryEvaluationKeepsItsOwnAndAnEarlierRunsIsNotMixedIn) {
 
   settings.scenarios = {"4, 1, 1"};
   ASSERT_EQ(runProgram({folder.writeSetup(settings)}).exitCode, 0);
-  EXPECT_TRUE(folder.has("basin_Saved.1/3/simulated.csv"));
-  EXPECT_FALSE(folder.has("basin_Saved/2"));
+  EXPECT_TRUE(folder.exists("basin_Saved.1/3/simulated.csv"));
+  EXPECT_FALSE(folder.exists("basin_Saved/2"));
 }
 
 TEST(FailedRuns, ASingleRunThatFailsEndsTheRunWithTheReason) {
@@ -198,7 +198,7 @@ TEST(Refusals, WhatIsMissingIsNamedBeforeAnyModelRun) {
     EXPECT_THAT(result.error, StartsWith("Error"));
     EXPECT_THAT(result.error, HasSubstr(c.message));
     EXPECT_THAT(folder.read("basin.log"), EndsWith("\n\n" + result.error));
-    EXPECT_FALSE(folder.has("basin_Optimisation.dat"));
+    EXPECT_FALSE(folder.exists("basin_Optimisation.dat"));
   }
 }
 

@@ -27,7 +27,7 @@ RunSettings slowRun() {
 
 class ViewerTest : public ::testing::Test {
  protected:
-  std::vector<std::string> attached() const { return {MIREVO_VIEWER, folder_.file("basin.kdx")}; }
+  std::vector<std::string> attached() const { return {MIREVO_VIEWER, (folder_ / "basin.kdx")}; }
   bool reaches(const std::string& file, const std::string& text) const {
     return waitUntil([&] { return folder_.read(file).find(text) != std::string::npos; });
   }
@@ -59,12 +59,12 @@ TEST_F(ViewerTest, AttachedItFollowsARunAndOnlyAConfirmedKeyCancelsIt) {
     viewer.type(otherKey);
     ASSERT_TRUE(viewer.shows("q cancel run"));
   }
-  EXPECT_FALSE(folder_.has("basin._kill_"));
+  EXPECT_FALSE(folder_.exists("basin._kill_"));
   viewer.type("q");
   ASSERT_TRUE(viewer.shows("Cancel the run?"));
   viewer.type("y");
   ASSERT_TRUE(viewer.shows("Cancelling"));
-  EXPECT_TRUE(folder_.has("basin._kill_"));
+  EXPECT_TRUE(folder_.exists("basin._kill_"));
   folder_.write("basin._spi_", runningRun() + "STATUSEnded: Simulation cancelled\nPROGRE100.0\n");
   ASSERT_TRUE(viewer.shows("Simulation cancelled"));
   viewer.type("q");
@@ -81,14 +81,14 @@ TEST_F(ViewerTest, AttachedLeavingInAnyWayLeavesNoTrace) {
     if (!key.empty()) viewer.type(key);
     EXPECT_EQ(viewer.wait(), 0);
     EXPECT_THAT(viewer.output(), HasSubstr(key.empty() ? "\x1b[?1049h" : "\x1b[?25h\x1b[?1049l"));
-    EXPECT_FALSE(folder_.has("basin._kill_"));
+    EXPECT_FALSE(folder_.exists("basin._kill_"));
   }
 }
 
 TEST_F(ViewerTest, AKillFileThatCannotBeMadeIsSaid) {
   folder_.write("basin.kdx", "");
   folder_.write("basin._spi_", runningRun());
-  std::filesystem::create_symlink("no/such/folder/file", folder_.file("basin._kill_"));
+  std::filesystem::create_symlink("no/such/folder/file", (folder_ / "basin._kill_"));
   TerminalProgram viewer(attached());
   ASSERT_TRUE(viewer.shows("Hand-made"));
   viewer.type("q");
@@ -177,7 +177,7 @@ TEST_F(ViewerTest, WithoutATerminalTheMessagesComeAsLines) {
   EXPECT_THAT(dumb.output(), HasSubstr("-- Normal termination"));
   EXPECT_THAT(dumb.output(), Not(HasSubstr("\x1b")));
 
-  std::filesystem::remove(folder_.file("basin._spi_"));
+  std::filesystem::remove((folder_ / "basin._spi_"));
   RunningProgram interrupted({"//qmon", folder_.writeSetup(slowRun())});
   ASSERT_TRUE(reaches("basin._spi_", "COMSPD"));
   interrupted.send(SIGTERM);
@@ -189,7 +189,7 @@ TEST_F(ViewerTest, WithoutASetupItSaysSo) {
   TerminalProgram none({MIREVO_VIEWER});
   EXPECT_EQ(none.wait(), 1);
   EXPECT_THAT(none.output(), HasSubstr("Usage: mirevo-viewer kdx-file"));
-  TerminalProgram missing({MIREVO_VIEWER, folder_.file("missing.kdx")});
+  TerminalProgram missing({MIREVO_VIEWER, (folder_ / "missing.kdx")});
   EXPECT_EQ(missing.wait(), 1);
   EXPECT_THAT(missing.output(), HasSubstr("missing.kdx"));
 }

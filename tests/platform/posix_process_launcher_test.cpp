@@ -76,6 +76,7 @@ class PosixProcessLauncherTest : public testing::Test {
     launcher_.createProcesses(1);
     return finish(1);
   }
+  bool hasContent(const std::string& name) const { return folder_.exists(name) && !folder_.read(name).empty(); }
   std::string read(const std::string& name) const { return folder_.read("run_Process1/" + name); }
 
   TemporaryFolder folder_;
@@ -261,7 +262,7 @@ TEST_F(PosixProcessLauncherTest, HaltingIsGentleFirstAndThenSure) {
     settings_.graceSeconds = c.graceSeconds;
     initialise();
     launcher_.createProcesses(1);
-    ASSERT_TRUE(comesTrue([&] { return !read("id.txt").empty(); })) << c.script;
+    ASSERT_TRUE(comesTrue([&] { return hasContent("run_Process1/id.txt"); })) << c.script;
     const auto start = Clock::now();
     launcher_.haltProcesses();
     EXPECT_LT(secondsSince(start), c.atMostSeconds) << c.script;
@@ -300,8 +301,7 @@ TEST_F(PosixProcessLauncherTest, NothingOutlivesTheProgram) {
       if (!launcher.initialise(settings_)) ::_exit(9);
       launcher.createProcesses(1);
       launcher.createProcesses(2);
-      comesTrue(
-          [&] { return !folder_.read("run_Process1/id.txt").empty() && !folder_.read("run_Process2/id.txt").empty(); });
+      comesTrue([&] { return hasContent("run_Process1/id.txt") && hasContent("run_Process2/id.txt"); });
       c.end();
       ::_exit(9);
     }

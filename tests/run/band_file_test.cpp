@@ -5,20 +5,20 @@
 #include <gtest/gtest.h>
 
 #include "platform/time_series_object.h"
-#include "run/temporary_folder.h"
+#include "temporary_folder.h"
 
 namespace mirevo {
 namespace {
 
 TEST(BandFile, IsATimeSeriesThatOurOwnReaderTakes) {
-  const testing::TemporaryFolder folder;
+  const TemporaryFolder folder;
   const double nan = std::numeric_limits<double>::quiet_NaN();
   const ObservedSeries observed{0, {2001, 2, 28, 23, 50, 0}, {0.0, 1.0 / 144.0, 1.5}, {0.1F, -2.0, 3.0}};
   const SeriesBand band{{1.0, nan, 3.0}, {4.0, nan, 6.5}, {7.0, nan, 1e-12}, 2, 0.5};
-  const std::string path = folder.file("x_Band_1.csv");
+  const std::string path = (folder / "x_Band_1.csv");
   writeBandFile(path, "Low\nflow", observed, band);
   writeBandFile(path, "Low\nflow", observed, band);
-  EXPECT_TRUE(folder.has("x_Band_1.1.csv"));
+  EXPECT_TRUE(folder.exists("x_Band_1.1.csv"));
   std::string reason;
   const auto series = createTimeSeriesObject(path, reason);
   ASSERT_TRUE(series && series->open(path)) << reason << series->lastError();

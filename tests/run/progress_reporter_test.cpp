@@ -2,7 +2,7 @@
 
 #include <gtest/gtest.h>
 
-#include "run/temporary_folder.h"
+#include "temporary_folder.h"
 
 namespace mirevo {
 namespace {
@@ -10,10 +10,10 @@ namespace {
 class ProgressReporterTest : public ::testing::Test {
  protected:
   std::string init(ProgressReporter& reporter, const std::string& destination = "") {
-    return reporter.progressInit(folder_.file("basin.log"), destination);
+    return reporter.progressInit((folder_ / "basin.log"), destination);
   }
 
-  testing::TemporaryFolder folder_;
+  TemporaryFolder folder_;
   double now_ = 1000.0;
   ProgressReporter reporter_{[this] { return now_; }};
 };
@@ -53,7 +53,7 @@ TEST_F(ProgressReporterTest, StandardOutputTakesMessagesAloneAndNoneTakesNothing
                                                             ? " Run started 2026-11-21 04:10:09 +0100 on host, process "
                                                               "7\n Evaluation of parameter set No. 1 initiated\n"
                                                             : "");
-    EXPECT_FALSE(folder_.has("basin._spi_"));
+    EXPECT_FALSE(folder_.exists("basin._spi_"));
   }
 }
 
@@ -74,17 +74,17 @@ TEST_F(ProgressReporterTest, SpeedFollowsTheLatestEvaluationsAndProgressStopsAtA
 TEST_F(ProgressReporterTest, OnlyAKillFileOfThisRunCancelsItAndForGood) {
   folder_.write("basin._kill_", "");
   init(reporter_);
-  EXPECT_FALSE(folder_.has("basin._kill_"));
+  EXPECT_FALSE(folder_.exists("basin._kill_"));
   EXPECT_FALSE(reporter_.isCancelled());
   folder_.write("basin._kill_", "");
   reporter_.progressStep();
-  std::filesystem::remove(folder_.file("basin._kill_"));
+  std::filesystem::remove((folder_ / "basin._kill_"));
   EXPECT_TRUE(reporter_.isCancelled());
 }
 
 TEST_F(ProgressReporterTest, AMessageFileThatCannotBeOpenedIsReportedAndTheRunGoesOn) {
-  std::filesystem::create_directories(folder_.file("basin._spi_"));
-  EXPECT_TRUE(init(reporter_).starts_with("Unable to open TqQmon2 message file: " + folder_.file("basin._spi_")));
+  std::filesystem::create_directories((folder_ / "basin._spi_"));
+  EXPECT_TRUE(init(reporter_).starts_with("Unable to open TqQmon2 message file: " + (folder_ / "basin._spi_")));
   reporter_.progressStart("2026-11-21 04:10:09 +0100 on host, process 7");
   reporter_.progressStep();
   EXPECT_FALSE(reporter_.isCancelled());
@@ -94,8 +94,8 @@ TEST_F(ProgressReporterTest, TheBaseNameLosesOnlyAKnownEnding) {
   for (const auto& [file, messages] :
        {std::pair{"a.log", "a._spi_"}, {"b.inp", "b._spi_"}, {"c.inp.log", "c.inp._spi_"}, {"d.txt", "d.txt._spi_"}}) {
     ProgressReporter reporter([this] { return now_; });
-    reporter.progressInit(folder_.file(file), "");
-    EXPECT_TRUE(folder_.has(messages)) << file;
+    reporter.progressInit((folder_ / file), "");
+    EXPECT_TRUE(folder_.exists(messages)) << file;
   }
 }
 

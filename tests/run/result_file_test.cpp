@@ -9,7 +9,7 @@
 #include "common/fatal_error.h"
 #include "common/text.h"
 #include "run/failed_run_file.h"
-#include "run/temporary_folder.h"
+#include "temporary_folder.h"
 
 namespace mirevo {
 namespace {
@@ -39,8 +39,8 @@ class ResultFileTest : public ::testing::Test {
   void open() { results_.open(path_, kHead, kColumns); }
   void add(const EvaluationResult& result, double parameter) { results_.addRow(std::span(&parameter, 1), result); }
 
-  testing::TemporaryFolder folder_;
-  std::string path_ = folder_.file("r.dat");
+  TemporaryFolder folder_;
+  std::string path_ = (folder_ / "r.dat");
   ResultFile results_;
 };
 
@@ -64,12 +64,12 @@ TEST_F(ResultFileTest, RowsEndUpInTheOrderOfTheirNumbers) {
     std::string expected(kHeadText);
     if (!arrival.empty()) expected += "1\tOK\t1\t1\t1\t1\n2\tOK\t2\t2\t2\t2\n3\tOK\t3\t3\t3\t3\n";
     EXPECT_EQ(folder_.read("r.dat"), expected + "# done\n# Best evaluation: 1\n");
-    EXPECT_FALSE(folder_.has("r.dat.tmp"));
+    EXPECT_FALSE(folder_.exists("r.dat.tmp"));
   }
 }
 
 TEST_F(ResultFileTest, RowsStayWhereTheyAreWhenTheyCannotBePutInOrder) {
-  std::filesystem::create_directories(folder_.file("r.dat.tmp/in the way"));
+  std::filesystem::create_directories((folder_ / "r.dat.tmp/in the way"));
   open();
   add(success(2, 2, 2), 2);
   add(success(1, 1, 1), 1);
@@ -116,23 +116,23 @@ TEST_F(ResultFileTest, ARowThatDoesNotFitLeavesNoTornHalf) {
 }
 
 TEST(KeepEarlierFile, NumbersWithoutOverwriting) {
-  const testing::TemporaryFolder folder;
+  const TemporaryFolder folder;
   for (const char* content : {"first", "second"}) {
     folder.write("a.b/r.dat", content);
-    keepEarlierFile(folder.file("a.b/r.dat"));
+    keepEarlierFile((folder / "a.b/r.dat"));
   }
   folder.write("a.b/noending", "x");
-  EXPECT_EQ(keepEarlierFile(folder.file("a.b/noending")), folder.file("a.b/noending.1"));
+  EXPECT_EQ(keepEarlierFile((folder / "a.b/noending")), (folder / "a.b/noending.1"));
   EXPECT_EQ(folder.read("a.b/r.1.dat"), "first");
   EXPECT_EQ(folder.read("a.b/r.2.dat"), "second");
-  EXPECT_EQ(keepEarlierFile(folder.file("a.b/r.dat")), "");
+  EXPECT_EQ(keepEarlierFile((folder / "a.b/r.dat")), "");
   EXPECT_EQ(keepEarlierFile("/dev/full"), "");
 }
 
 TEST(FailedRunFile, AppearsWithTheFirstFailureAndSaysWhatHappened) {
-  const testing::TemporaryFolder folder;
-  FailedRunFile file(folder.file("calSimErr.dat"), "basin", {"k", "n"});
-  EXPECT_FALSE(folder.has("calSimErr.dat"));
+  const TemporaryFolder folder;
+  FailedRunFile file((folder / "calSimErr.dat"), "basin", {"k", "n"});
+  EXPECT_FALSE(folder.exists("calSimErr.dat"));
   const std::vector<double> values{0.1, 2.0};
   file.add(values, failure(4));
   EvaluationResult silent = failure(9);

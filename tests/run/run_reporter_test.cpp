@@ -7,7 +7,7 @@
 #include <gtest/gtest.h>
 
 #include "common/text.h"
-#include "run/temporary_folder.h"
+#include "temporary_folder.h"
 
 namespace mirevo {
 namespace {
@@ -22,10 +22,10 @@ class RunReporterTest : public ::testing::Test {
     space_.upper = {10.0};
     space_.transformation = {TransformationType::logarithmic};
     std::string reason;
-    state_.log.open(folder_.file("s.log"), reason);
-    state_.progress.progressInit(folder_.file("s.log"), "");
+    state_.log.open((folder_ / "s.log"), reason);
+    state_.progress.progressInit((folder_ / "s.log"), "");
     state_.progress.progressEvaluationLabel(4);
-    results_.open(folder_.file("s.dat"), {}, {{"k"}, {}, {"fit"}});
+    results_.open((folder_ / "s.dat"), {}, {{"k"}, {}, {"fit"}});
   }
 
   void finish(int number, double objective, double set = 0.0) {
@@ -39,11 +39,11 @@ class RunReporterTest : public ::testing::Test {
     reporter_.evaluationFinished(std::span(&set, 1), result);
   }
 
-  testing::TemporaryFolder folder_;
+  TemporaryFolder folder_;
   RunState state_;
   SearchSpace space_;
   ResultFile results_;
-  FailedRunFile failedRuns_{folder_.file("calSimErr.dat"), "s", {"k"}};
+  FailedRunFile failedRuns_{(folder_ / "calSimErr.dat"), "s", {"k"}};
   RunReporter reporter_{state_, results_, failedRuns_, space_};
 };
 

@@ -14,16 +14,16 @@
 
 #include "run/signal_state.h"
 #include "run/stop_run.h"
-#include "run/temporary_folder.h"
+#include "temporary_folder.h"
 
 namespace mirevo {
 namespace {
 
 /// In a process of its own: logs opened and handlers installed as the run does it, then `act`.
 template <typename Act>
-void actWithHandlers(const testing::TemporaryFolder& folder, const char* buildMode, const char* frontEnd, Act act) {
+void actWithHandlers(const TemporaryFolder& folder, const char* buildMode, const char* frontEnd, Act act) {
   const auto open = [&](const char* name) {
-    return ::open(folder.file(name).c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_APPEND, 0666);
+    return ::open((folder / name).c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_APPEND, 0666);
   };
   ::setenv("BUILDMODE", buildMode, 1);
   ::setenv("G48", frontEnd, 1);
@@ -43,7 +43,7 @@ const struct {
 
 TEST(SignalHandlers, EverySignalEndsTheRunWithItsMessageInEveryPlace) {
   for (const auto& [signal, message] : kSignals) {
-    const testing::TemporaryFolder folder;
+    const TemporaryFolder folder;
     EXPECT_EXIT(actWithHandlers(folder, "", "WIN", [signal = signal] { ::raise(signal); }),
                 ::testing::ExitedWithCode(128 + signal), message);
     EXPECT_EQ(folder.read("run.log"), fmt::format("\n{}\n", message));
@@ -53,7 +53,7 @@ TEST(SignalHandlers, EverySignalEndsTheRunWithItsMessageInEveryPlace) {
 
 TEST(SignalHandlers, AnUnattendedRunShowsTheMessageOnlyWithoutAFrontEnd) {
   for (const char* frontEnd : {"WIN", "QMON", ""}) {
-    const testing::TemporaryFolder folder;
+    const TemporaryFolder folder;
     EXPECT_EXIT(actWithHandlers(folder, "NIGHT", frontEnd, [] { ::raise(SIGTERM); }), ::testing::ExitedWithCode(143),
                 "^$");
     EXPECT_EQ(folder.read("stdout"), *frontEnd == '\0' ? "Termination request\n" : "");
@@ -62,7 +62,7 @@ TEST(SignalHandlers, AnUnattendedRunShowsTheMessageOnlyWithoutAFrontEnd) {
 }
 
 TEST(SignalHandlers, TheReasonIsLoggedBeforeTheModelIsHalted) {
-  const testing::TemporaryFolder folder;
+  const TemporaryFolder folder;
   const auto haltWhileSayingSo = [] {
     signalState.haltProcesses = [] { writeLineFromSignal(signalState.runLogDescriptor, "halted"); };
     ::raise(SIGINT);
@@ -90,7 +90,7 @@ TEST(SignalHandlers, FloatingPointSubCodesHaveTheirOwnMessages) {
 
 #if defined(__x86_64__) && defined(__GLIBC__)
 TEST(SignalHandlers, TrappedZeroDivideEndsTheRunAndUnderflowDoesNot) {
-  const testing::TemporaryFolder folder;
+  const TemporaryFolder folder;
   const auto divide = [] {
     ::feenableexcept(FE_DIVBYZERO);
     volatile double zero = 0.0;
@@ -110,7 +110,7 @@ TEST(SignalHandlers, TrappedZeroDivideEndsTheRunAndUnderflowDoesNot) {
 #endif
 
 TEST(StopRun, TheCompletionLineGoesToATerminationLogThatIsSet) {
-  const testing::TemporaryFolder folder;
+  const TemporaryFolder folder;
   for (const int exitCode : {0, 1}) {
     EXPECT_EXIT(actWithHandlers(folder, "", "WIN", [&] { stopRun(exitCode); }), ::testing::ExitedWithCode(exitCode),
                 "");

@@ -2,7 +2,7 @@
 
 #include <gtest/gtest.h>
 
-#include "run/temporary_folder.h"
+#include "temporary_folder.h"
 
 namespace mirevo {
 namespace {
@@ -15,8 +15,8 @@ class MessageFileTest : public ::testing::Test {
   }
   const ProgressState& state() const { return records_.state(); }
 
-  testing::TemporaryFolder folder_;
-  MessageFile file_{folder_.file("basin._spi_")};
+  TemporaryFolder folder_;
+  MessageFile file_{(folder_ / "basin._spi_")};
   ProgressRecords records_;
 };
 
@@ -36,7 +36,7 @@ TEST_F(MessageFileTest, AFileThatComesGrowsAndGoesIsFollowed) {
   readAll();
   EXPECT_EQ(state().title, "BC");
   EXPECT_EQ(state().done, 30000);
-  std::filesystem::remove(folder_.file("basin._spi_"));
+  std::filesystem::remove((folder_ / "basin._spi_"));
   readAll();
   EXPECT_EQ(state().done, 30000);
 }
@@ -55,7 +55,7 @@ TEST_F(MessageFileTest, AnotherRunIsNoticedWhetherItsFileIsShorterOrHasOutgrownT
 }
 
 TEST_F(MessageFileTest, AFolderInItsPlaceIsNoFile) {
-  std::filesystem::create_directories(folder_.file("basin._spi_"));
+  std::filesystem::create_directories((folder_ / "basin._spi_"));
   readAll();
   EXPECT_FALSE(state().hasRecords);
 }
