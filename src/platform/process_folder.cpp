@@ -209,7 +209,9 @@ class FolderCopy final {
     for (const std::string& name : *names) {
       const bool isBatchLog = below.empty() && name == kBatchLogName;
       const bool isProcessFolder = holdsProcessFolders && processFolders_.contains(name);
-      if (!isBatchLog && !isProcessFolder && !runMade.contains(name)) copyEntry(below + "/" + name);
+      if (isBatchLog || isProcessFolder || runMade.contains(name)) continue;
+      std::string path = below;
+      copyEntry(path.append("/").append(name));
     }
   }
 

@@ -229,6 +229,13 @@ class HangingMpi : public Mpi {
     for (const int process : {model_, worker_, grandchild_}) expectGone(process);
   }
 
+  /// mpirun gives the ranks so many seconds between SIGTERM and SIGKILL; its own one is short for a busy machine.
+  static RunningProgram::Environment patientEnvironment() {
+    RunningProgram::Environment variables = environment();
+    variables["OMPI_MCA_odls_base_sigkill_timeout"] = "3";
+    return variables;
+  }
+
   std::string setup_;
   int model_ = 0;
   int worker_ = 0;
@@ -252,7 +259,7 @@ TEST_F(HangingMpi, AKillFileStopsEveryRankInFiveSeconds) {
 }
 
 TEST_F(HangingMpi, ATerminatedLauncherLeavesNoProcess) {
-  RunningProgram job(command(3, {setup_}), environment(), "mpirun");
+  RunningProgram job(command(3, {setup_}), patientEnvironment(), "mpirun");
   waitUntilOneIsLeft();
   job.send(SIGTERM);
   const ProgramResult result = job.wait(20.0);
@@ -263,7 +270,7 @@ TEST_F(HangingMpi, ATerminatedLauncherLeavesNoProcess) {
 }
 
 TEST_F(HangingMpi, AKilledWorkerEndsTheJob) {
-  RunningProgram job(command(3, {setup_}), environment(), "mpirun");
+  RunningProgram job(command(3, {setup_}), patientEnvironment(), "mpirun");
   waitUntilOneIsLeft();
   ::kill(worker_, SIGKILL);
   const ProgramResult result = job.wait(20.0);
