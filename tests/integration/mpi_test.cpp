@@ -138,7 +138,7 @@ TEST_F(Mpi, ASetupBesideItsModelIsRunByManyRanks) {
   settings.option = 0;
   settings.scenarios = scenarios(20);
   settings.modelArguments = "--fail-above 8.3";
-  for (const char* processFolders : {"", "", "scratch", "scratch"}) {
+  for (const char* processFolders : {"", "", "scratch"}) {
     settings.processFolder = processFolders;
     const ProgramResult job = runJob(12, {folder_.writeSetup(settings)});
     ASSERT_EQ(job.exitCode, 0) << job.error << log();
