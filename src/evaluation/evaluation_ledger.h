@@ -47,7 +47,8 @@ class EvaluationLedger final {
   int evaluationCount_ = 0;        ///< sets of the batches before this one
 };
 
-/// Evaluator::settleAggregates() of the evaluators that run models.
-void settleAggregates(ObjectiveAggregator& aggregator, std::span<EvaluationResult> sample);
+/// Evaluator::settleAggregates() of the evaluators that run models; the scales found are reported as messages.
+void settleAggregates(ObjectiveAggregator& aggregator, std::span<EvaluationResult> sample,
+                      EvaluationObserver& observer);
 
 }  // namespace mirevo

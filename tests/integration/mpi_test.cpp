@@ -13,12 +13,6 @@ using ::testing::AnyOf;
 using ::testing::HasSubstr;
 using ::testing::Not;
 
-/// Everything in a result file but when it was made.
-std::string withoutDate(const std::string& results) {
-  const auto start = results.find("# Started: ");
-  return start == std::string::npos ? results : results.substr(0, start) + results.substr(results.find('\n', start));
-}
-
 int occurrences(const std::string& text, const std::string& wanted) {
   int count = 0;
   for (auto at = text.find(wanted); at != std::string::npos; at = text.find(wanted, at + 1)) ++count;
@@ -88,13 +82,15 @@ TEST_F(Mpi, AJobWritesTheResultsOfAPlainRun) {
     int processes;
   } cases[] = {
       {{.maxEvaluations = 25}, "basin_Optimisation.dat", 2},
+      {{.algorithm = 0, .maxEvaluations = 25}, "basin_Optimisation.dat", 3},
+      {{.algorithm = 1, .maxEvaluations = 25}, "basin_Optimisation.dat", 5},
       {{.option = 3, .maxEvaluations = 15, .savedFile = "model/simulated.csv"}, "basin.dat", 3},
       // Two of them fail, which is as many as may.
       {{.option = 0, .scenarios = scenarios(20), .modelArguments = "--fail-above 8", .processFolder = "scratch/made"},
        "basin.dat",
        3},
   };
-  useScript("env | grep -cE '^(OMPI|PMIX|PMI)_' > job_variables.txt");
+  useScript(fmt::format("{}\nenv | grep -cE '^(OMPI|PMIX|PMI)_' > job_variables.txt", kSleepByParameters));
   for (const auto& c : cases) {
     const std::string setup = folder_.writeSetup(c.settings);
     ASSERT_EQ(runProgram({setup}).exitCode, 0) << log();
