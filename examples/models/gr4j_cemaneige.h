@@ -39,8 +39,8 @@ struct Parameters {
 /// the day is below zero.
 double solidFractionOfRange(double tmin, double tmax);
 
-/// The same by the mean temperature alone, falling from 1 at -1 degC to 0 at 3 degC (the choice for higher catchments, after
-/// U.S. Army Corps of Engineers 1956, Snow Hydrology).
+/// The same by the mean temperature alone, falling from 1 at -1 degC to 0 at 3 degC (the choice for higher catchments,
+/// after U.S. Army Corps of Engineers 1956, Snow Hydrology).
 double solidFractionOfMean(double temperature);
 
 /// CemaNeige for one band.

@@ -90,8 +90,7 @@ TEST_F(ModelFiles, RoutesTheUpstreamDischargeAndAddsTheLateralOfTheSameDays) {
   const std::string lateral = "2001-01-01,x,1\n2001-01-02,x,2.5\n";
   const std::string reach = "K = 2.3\nX = 0.15\n";
   ASSERT_EQ(routeWith(reach, upstream, lateral), "");
-  EXPECT_EQ(folder_.read("r.csv"),
-            std::string(kRiverHeader) + "2001-01-01,94,93,1\n2001-01-02,98.278,95.778,2.5\n");
+  EXPECT_EQ(folder_.read("r.csv"), std::string(kRiverHeader) + "2001-01-01,94,93,1\n2001-01-02,98.278,95.778,2.5\n");
   const std::vector<std::array<std::string, 4>> cases{
       {reach, upstream, "2001-01-01,x,1\n", "l.csv: ends before 2001-01-02"},
       {reach, upstream, "2001-01-02,x,1\n", "l.csv:2: expected the day 2001-01-01"},
