@@ -61,13 +61,15 @@ std::vector<EvaluationResult> EvaluationLedger::end() {
   return std::exchange(results_, {});
 }
 
-void settleAggregates(ObjectiveAggregator& aggregator, std::span<EvaluationResult> sample) {
+void settleAggregates(ObjectiveAggregator& aggregator, std::span<EvaluationResult> sample,
+                      EvaluationObserver& observer) {
   if (aggregator.isSettled()) return;
   std::vector<std::vector<double>> succeeded;
   for (const EvaluationResult& result : sample) {
     if (result.ok()) succeeded.push_back(result.objectiveValues);
   }
   aggregator.fit(succeeded);
+  for (const std::string& line : aggregator.scaleLines()) observer.message(line);
   for (EvaluationResult& result : sample) {
     if (result.ok()) result.aggregate = aggregator.aggregate(result.objectiveValues);
   }

@@ -52,7 +52,8 @@ class EvaluationLedger final {
   std::map<std::size_t, std::size_t> fewestUsed_;  ///< observations that a warning was given for, by measure
 };
 
-/// Evaluator::settleAggregates() of the evaluators that run models.
-void settleAggregates(ObjectiveAggregator& aggregator, std::span<EvaluationResult> sample);
+/// Evaluator::settleAggregates() of the evaluators that run models; the scales found are reported as messages.
+void settleAggregates(ObjectiveAggregator& aggregator, std::span<EvaluationResult> sample,
+                      EvaluationObserver& observer);
 
 }  // namespace mirevo

@@ -108,7 +108,7 @@ void MpiEvaluator::stopIfCancelled() {
 }
 
 void MpiEvaluator::settleAggregates(std::span<EvaluationResult> sample) {
-  mirevo::settleAggregates(runner_.aggregator(), sample);
+  mirevo::settleAggregates(runner_.aggregator(), sample, observer_);
 }
 
 void beginWorkers(MessageChannel& channel, const BeginMessage& message) {

@@ -81,6 +81,8 @@ struct RunConfig {
   /// Model evaluations that the task plans; sizes the failed-run limit and the progress report. 0 where the simulation
   /// option names no task.
   int plannedEvaluations() const;
+  /// Whether the task's results depend on the random seed.
+  bool drawsRandomNumbers() const;
   std::size_t variableParameterCount() const;
 };
 

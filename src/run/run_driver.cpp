@@ -161,18 +161,18 @@ void RunDriver::openResultFile() {
   columns.parameters = parameters_->searchSpace().names;
   for (const OutputMeasure& measure : config_.measures) columns.measures.push_back(measure.name);
   for (const ObjectiveFunction& objective : config_.objectives) columns.objectives.push_back(objective.name);
-  const std::vector<std::string> head{config_.title,
-                                      fmt::format("Mirevo {}", programVersion()),
-                                      taskName(config_),
-                                      fmt::format("Random seed: {}", config_.randomSeed),
-                                      "Setup file: " + config_.setupFile,
-                                      "Started: " + dateAndTimeNow()};
+  std::vector<std::string> head{config_.title, fmt::format("Mirevo {}", programVersion()), taskName(config_)};
+  if (config_.drawsRandomNumbers()) head.push_back(fmt::format("Random seed: {}", config_.randomSeed));
+  head.push_back("Setup file: " + config_.setupFile);
+  head.push_back("Started: " + dateAndTimeNow());
   results_.open(path, head, columns);
 }
 
 std::vector<std::string> RunDriver::closingLines(std::string_view terminationMessage) const {
   std::vector<std::string> lines{std::string(terminationMessage)};
   if (!reporter_ || !reporter_->best()) return lines;
+  const std::vector<std::string> scales = aggregator_->scaleLines();
+  lines.insert(lines.end(), scales.begin(), scales.end());
   const RunReporter::Best& best = *reporter_->best();
   lines.push_back(fmt::format("Best evaluation: {}", best.number));
   lines.push_back("Best aggregate: " + formatReal(best.aggregate));

@@ -16,12 +16,6 @@ using ::testing::Not;
 /// A model that uses MPI itself must not take itself for a process of this job.
 constexpr char kCountsJobVariables[] = "env | grep -cE '^(OMPI|PMIX|PMI)_' > job_variables.txt";
 
-/// Everything in a result file but when it was made.
-std::string withoutDate(const std::string& results) {
-  const auto start = results.find("# Started: ");
-  return start == std::string::npos ? results : results.substr(0, start) + results.substr(results.find('\n', start));
-}
-
 int occurrences(const std::string& text, const std::string& wanted) {
   int count = 0;
   for (auto at = text.find(wanted); at != std::string::npos; at = text.find(wanted, at + 1)) ++count;
@@ -92,13 +86,15 @@ TEST_F(Mpi, AJobWritesTheResultsOfAPlainRun) {
     int jobSlots = 1;  // what the setup has for the job, where it counts for nothing
   } cases[] = {
       {{.maxEvaluations = 25}, "basin_Optimisation.dat", 2, 3},
+      {{.algorithm = 0, .maxEvaluations = 25}, "basin_Optimisation.dat", 3},
+      {{.algorithm = 1, .maxEvaluations = 25}, "basin_Optimisation.dat", 5},
       {{.option = 3, .maxEvaluations = 15, .savedFile = "model/simulated.csv"}, "basin.dat", 3},
       // Two of them fail, which is as many as may.
       {{.option = 0, .scenarios = scenarios(20), .modelArguments = "--fail-above 8", .processFolder = "scratch/made"},
        "basin.dat",
        3},
   };
-  useScript(kCountsJobVariables);
+  useScript(fmt::format("{}\n{}", kSleepByParameters, kCountsJobVariables));
   for (const auto& c : cases) {
     RunSettings settings = c.settings;
     const std::string setup = folder_.writeSetup(settings);
