@@ -6,7 +6,6 @@
 namespace mirevo {
 namespace {
 
-constexpr std::size_t kBatchesPerGeneration = 4;
 /// Of the width of the simplex's box, added on either side of it, so that a mutation can leave it.
 constexpr double kBoxWidening = 0.05;
 
@@ -32,58 +31,63 @@ bool Pse::areSettingsValid() const {
 }
 
 void Pse::makeLoop() {
-  const std::size_t size = population_.size();
-  const std::size_t batch = (size + kBatchesPerGeneration - 1) / kBatchesPerGeneration;
-  for (std::size_t made = 0; made < size && !isBudgetUsedUp(); made += batch) {
-    makeBatch(std::min(batch, size - made));
-    sortBestFirst(population_);
-  }
-}
-
-void Pse::makeBatch(std::size_t count) {
+  // Worst first: what a budget cuts off a generation are the proposals for its best points.
   std::vector<Offspring> offspring;
   std::vector<ParameterSet> proposals;
-  for (std::size_t i = 0; i < count * proposalsPerRun(); ++i) {
-    offspring.push_back(makeOffspring());
-    proposals.push_back(offspring.back().set);
+  for (std::size_t place = population_.size(); place-- > 0;) {
+    for (std::size_t i = 0; i < proposalsPerRun(); ++i) {
+      offspring.push_back(makeOffspring(place));
+      proposals.push_back(offspring.back().set);
+    }
   }
-  const std::vector<std::size_t> chosen = mostPromising(proposals, count);
+  const std::vector<std::size_t> chosen = mostPromising(proposals, population_.size());
   for (std::size_t i = 0; i < chosen.size(); ++i) {
     offspring[i] = offspring[chosen[i]];
     proposals[i] = offspring[i].set;
   }
   proposals.resize(chosen.size());
-  std::vector<std::optional<EvaluationResult>> results = evaluate(proposals);
+  replaceParents(offspring, proposals);
+}
 
+void Pse::replaceParents(std::span<const Offspring> offspring, std::span<const ParameterSet> proposals) {
+  std::vector<std::optional<EvaluationResult>> results = evaluate(proposals);
   std::vector<bool> isReplaced(population_.size(), false);
   for (std::size_t i = 0; i < proposals.size(); ++i) {
     if (!results[i]) continue;
     const std::size_t place = offspring[i].parent;
     Individual& parent = population_[place];
-    // A mutation never takes the place of a point that this batch has just found.
-    const bool isTakenAnyway = offspring[i].isMutation && !isReplaced[place] && isUsable(*results[i]);
+    // A mutation takes the place neither of the best point nor of one that this generation has just found.
+    const bool isTakenAnyway = offspring[i].isMutation && place > 0 && !isReplaced[place] && isUsable(*results[i]);
     if (!isTakenAnyway && !isBetter(results[i]->aggregate, parent.value())) continue;
-    parent = {std::move(offspring[i].set), std::move(*results[i])};
+    parent = {proposals[i], std::move(*results[i])};
     isReplaced[place] = true;
   }
 }
 
-Pse::Offspring Pse::makeOffspring() {
+/// The other points of the simplex: better ones than the parent, which is one of the few best where there are too few.
+std::vector<std::size_t> Pse::drawOthers(std::size_t parent) {
+  const auto count = static_cast<std::size_t>(simplex_.pointCount) - 1;
+  if (parent >= count) return drawSimplex(count, parent);
+  std::vector<std::size_t> places = drawSimplex(count, population_.size() - 1);
+  for (std::size_t& place : places) place += place >= parent ? 1 : 0;
+  return places;
+}
+
+Pse::Offspring Pse::makeOffspring(std::size_t parent) {
   const double move = draw();
-  const std::vector<std::size_t> places =
-      drawSimplex(static_cast<std::size_t>(simplex_.pointCount), population_.size());
+  std::vector<std::size_t> places = drawOthers(parent);
   Offspring offspring;
-  offspring.parent = places.back();
+  offspring.parent = parent;
   const double ofReflection = settings_.reflectionProbability;
   if (move >= ofReflection + settings_.contractionProbability) {
     offspring.isMutation = true;
+    places.push_back(parent);
     offspring.set = reflectedAtBounds(drawFrom(widened(boundingBox(population_, places))));
     return offspring;
   }
   const std::size_t n = bounds().size();
-  const std::vector<double> g = centroid(population_, std::span(places).first(places.size() - 1));
   const double factor = move < ofReflection ? -reflectionFactor(n) : contractionFactor(n);
-  offspring.set = reflectedAtBounds(pointOnRay(g, population_[offspring.parent].set, factor));
+  offspring.set = reflectedAtBounds(pointOnRay(centroid(population_, places), population_[parent].set, factor));
   return offspring;
 }
 

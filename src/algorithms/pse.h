@@ -1,22 +1,25 @@
 #pragma once
 
 #include <cstddef>
+#include <span>
+#include <vector>
 
 #include "algorithms/population_search.h"
 
 namespace mirevo {
 
-/// Population Simplex Evolution: the moves of SCE on one population without complexes, in large batches.
+/// Population Simplex Evolution: the moves of SCE on one population without complexes, a whole generation in one batch.
 ///
-/// A loop, one generation, makes N offspring for a population of N, in four batches of a quarter each. Every offspring
-/// draws a simplex of q distinct points, better points more often, and is to take the place of its worst point u; with
-/// the centroid g of the others it is
-///   with `reflectionProbability` the reflection g − a·(u − g), taken when better than u;
-///   with `contractionProbability` the contraction g + c·(u − g), taken when better than u;
+/// A loop, one generation, makes an offspring of every point u of the population. It draws q − 1 distinct points better
+/// than u, better ones more often (for the few best, of which there are too few, any others); with their centroid g the
+/// offspring is
+///   with `reflectionProbability` the reflection g − a·(u − g), which takes u's place when better;
+///   with `contractionProbability` the contraction g + c·(u − g), which takes u's place when better;
 ///   else a mutation, a random point of the simplex's box widened by a twentieth of its width on either side, always
-///   taken: it keeps the population from collapsing too soon.
-/// Coordinates outside the bounds are reflected at them. a and c are those of SCE. As u is never the best point, the
-/// best point never worsens. What the alternatives cost is measured in docs/algorithms/pse.md.
+///   taken but for the best point, which it takes the place of only when better: it keeps the population from
+///   collapsing too soon.
+/// Coordinates outside the bounds are reflected at them. a and c are those of SCE. The best point never worsens. What
+/// the alternatives cost is measured in docs/algorithms/pse.md.
 class Pse final : public PopulationSearch {
  public:
   Pse(const PseSettings& settings, const SimplexSettings& simplex, SearchProblem problem);
@@ -32,8 +35,9 @@ class Pse final : public PopulationSearch {
   std::size_t populationSize() const override { return static_cast<std::size_t>(settings_.populationSize); }
   void makeLoop() override;
 
-  void makeBatch(std::size_t count);
-  Offspring makeOffspring();
+  std::vector<std::size_t> drawOthers(std::size_t parent);
+  Offspring makeOffspring(std::size_t parent);
+  void replaceParents(std::span<const Offspring> offspring, std::span<const ParameterSet> proposals);
 
   PseSettings settings_;
   SimplexSettings simplex_;

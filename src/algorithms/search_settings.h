@@ -33,7 +33,7 @@ struct SceSettings {
 struct PseSettings {
   std::int32_t populationSize = 50;
   double reflectionProbability = 0.5;
-  double contractionProbability = 0.2;  ///< what is left to 1 is the probability of a mutation
+  double contractionProbability = 0.15;  ///< what is left to 1 is the probability of a mutation
 };
 
 struct DdsSettings {

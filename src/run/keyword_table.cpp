@@ -300,7 +300,7 @@ const std::vector<KeywordRow>& rows() {
        MIREVO_FIELD(c.optimisation.simplex.pointCount)},
       {kPse, "Prob_Reflection", Type::real, "0.5", kFraction, "", "Probability of a reflection.",
        MIREVO_FIELD(c.optimisation.pse.reflectionProbability)},
-      {kPse, "Prob_Contraction", Type::real, "0.2", kFraction, "",
+      {kPse, "Prob_Contraction", Type::real, "0.15", kFraction, "",
        "Probability of a contraction; what both leave of 1 is that of a mutation.",
        MIREVO_FIELD(c.optimisation.pse.contractionProbability)},
       {kDds, "Perturbation_Parameter", Type::real, "0.2", kFraction, "",

@@ -225,15 +225,21 @@ TEST(Sce, RunsOneProposalOfEveryComplexAtATime) {
   EXPECT_EQ(evaluator.batches[1].size(), 6U);
 }
 
-TEST(Pse, RunsAGenerationInFourBatches) {
+TEST(Pse, RunsAGenerationInOneBatchAndKeepsItsBestPoint) {
   FunctionEvaluator evaluator([](const ParameterSet& x) { return resultOf(testing::rosenbrock(x)); });
   UniformGenerator random(3);
-  Pse pse({22}, {3}, {{{-5, -2}, {5, 8}, {0, 0}}, onBudget(100000), {}, {}, evaluator, random});
+  PseSettings onlyMutations{22, 0.0, 0.0};
+  Pse pse(onlyMutations, {3}, {{{-5, -2}, {5, 8}, {0, 0}}, onBudget(100), {}, {}, evaluator, random});
   ASSERT_EQ(pse.initialise(), kSearchOk);
-  ASSERT_EQ(pse.advance(), kSearchOk);
+  double best = pse.population().front().value();
+  while (!pse.isTerminated()) {
+    ASSERT_EQ(pse.advance(), kSearchOk);
+    EXPECT_LE(pse.population().front().value(), best);
+    best = pse.population().front().value();
+  }
   std::vector<std::size_t> sizes;
   for (const auto& batch : evaluator.batches) sizes.push_back(batch.size());
-  EXPECT_THAT(sizes, ::testing::ElementsAre(22, 6, 6, 6, 4));
+  EXPECT_THAT(sizes, ::testing::ElementsAre(22, 22, 22, 22, 12));
 }
 
 }  // namespace
