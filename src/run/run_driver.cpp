@@ -1,7 +1,9 @@
 #include "run/run_driver.h"
 
 #include <filesystem>
+#include <map>
 #include <new>
+#include <set>
 #include <unistd.h>
 
 #include <fmt/format.h>
@@ -132,42 +134,80 @@ void RunDriver::logSetup() {
 void RunDriver::openResults() {
   state_.objectiveValues.resize(config_.objectives.size());
   const SearchSpace& space = parameters_->searchSpace();
-  const std::string failedRunPath = std::filesystem::path(filePrefix_).replace_filename("calSimErr.dat").string();
-  keepEarlierFile(failedRunPath);
-  failedRunFile_ = std::make_unique<FailedRunFile>(failedRunPath, config_.setupName, space.names);
-
-  openResultFile();
-  if (const std::string kept = keepEarlierFile(filePrefix_ + "_Saved"); !kept.empty()) {
-    state_.log.line("The saved output files of the earlier run were kept as " + kept);
-  }
-  reporter_ = std::make_unique<RunReporter>(state_, results_, *failedRunFile_, space);
-  failedRunPolicy_.emplace(config_.plannedEvaluations());
+  failedRunFile_ = std::make_unique<FailedRunFile>(
+      std::filesystem::path(filePrefix_).replace_filename(kFailedRunFileName).string(), config_.setupName, space.names);
+  const std::string_view ending = resultFileEnding(config_);
+  if (!ending.empty()) openResultFiles(filePrefix_ + std::string(ending));
+  reporter_ = std::make_unique<RunReporter>(state_, results_, *failedRunFile_, space,
+                                            simulatedValuesFile_ ? &*simulatedValuesFile_ : nullptr);
+  failedRunPolicy_.emplace(config_.plannedEvaluations(), config_.failedRunFolders);
+  EarlierEvaluations* const earlier = earlierEvaluations_ ? &*earlierEvaluations_ : nullptr;
   if (state_.mpiInUse) {
-    evaluator_ = std::make_unique<MpiEvaluator>(*runner_, state_.mpi, *reporter_, *failedRunPolicy_);
+    evaluator_ = std::make_unique<MpiEvaluator>(*runner_, state_.mpi, *reporter_, *failedRunPolicy_, earlier);
   } else {
-    evaluator_ =
-        std::make_unique<LocalEvaluator>(*runner_, *reporter_, *failedRunPolicy_, config_.simultaneousSimulations);
+    evaluator_ = std::make_unique<LocalEvaluator>(*runner_, *reporter_, *failedRunPolicy_,
+                                                  config_.simultaneousSimulations, earlier);
   }
 }
 
-void RunDriver::openResultFile() {
-  const std::string_view ending = resultFileEnding(config_);
-  if (ending.empty()) return;
-  const std::string path = filePrefix_ + std::string(ending);
-  if (const std::string kept = keepEarlierFile(path); !kept.empty()) {
-    state_.log.line("The results of the earlier run were kept as " + kept);
-  }
+void RunDriver::openResultFiles(const std::string& path) {
   ResultColumns columns;
   columns.parameters = parameters_->searchSpace().names;
   for (const OutputMeasure& measure : config_.measures) columns.measures.push_back(measure.name);
   for (const ObjectiveFunction& objective : config_.objectives) columns.objectives.push_back(objective.name);
-  const std::vector<std::string> head{config_.title,
-                                      fmt::format("Mirevo {}", programVersion()),
-                                      taskName(config_),
-                                      fmt::format("Random seed: {}", config_.randomSeed),
-                                      "Setup file: " + config_.setupFile,
-                                      "Started: " + dateAndTimeNow()};
+  const RestartFiles files = restartFiles(path);
+  if (keepsSimulatedValues(config_)) {
+    std::size_t count = 0;
+    for (const ObservedSeries& series : runner_->observedSeries()) count += series.values.size();
+    simulatedValuesFile_.emplace(files.simulatedValues, count);
+  }
+  auto earlier = config_.restart != 0 ? findEarlierRun(files, config_, columns) : std::nullopt;
+  if (earlier) return goOnFrom(*std::move(earlier), files, columns);
+  if (config_.restart != 0) state_.log.line("Restart: there are no earlier results to go on from, the run begins anew");
+  beginAnew(files);
+  std::vector<std::string> head = headLines();
+  head.push_back("Started: " + dateAndTimeNow());
   results_.open(path, head, columns);
+}
+
+void RunDriver::beginAnew(const RestartFiles& files) {
+  keepEarlierFile(failedRunFile_->path());
+  if (const std::string kept = keepEarlierFile(files.results); !kept.empty()) {
+    state_.log.line("The results of the earlier run were kept as " + kept);
+  }
+  keepEarlierFile(files.settings);
+  keepEarlierFile(files.simulatedValues);
+  if (const std::string kept = keepEarlierFile(filePrefix_ + "_Saved"); !kept.empty()) {
+    state_.log.line("The saved output files of the earlier run were kept as " + kept);
+  }
+  for (const std::string& problem : removeFailedRunFolders(config_)) state_.log.warning(problem);
+  // Before there is a result, so that none is ever without the settings that it depends on.
+  writeRestartSettings(files.settings, config_);
+  if (simulatedValuesFile_) simulatedValuesFile_->create();
+}
+
+void RunDriver::goOnFrom(EarlierRun run, const RestartFiles& files, const ResultColumns& columns) {
+  config_.optimisation.earlierSearches = run.searches;
+  std::set<int> failed;
+  std::set<int> succeeded;
+  for (const ResultTable::Row& row : run.rows) (row.ok ? succeeded : failed).insert(row.number);
+  const std::map<int, EvaluationFailure> failures = failedRunFile_->takeUp(failed);
+  std::optional<std::map<int, std::vector<double>>> simulatedValues;
+  if (simulatedValuesFile_) simulatedValues = simulatedValuesFile_->takeUp(succeeded);
+  auto records = earlierRecords(run, columns, failures, std::move(simulatedValues));
+  std::vector<std::string> head = headLines();
+  head.insert(head.end(), run.history.begin(), run.history.end());
+  head.push_back("Restarted: " + dateAndTimeNow());
+  results_.open(files.results, head, columns, run.rows);
+  writeRestartSettings(files.settings, config_);
+  for (const std::string& note : run.notes) state_.log.line(note);
+  state_.log.line(fmt::format("Restart: {} evaluations are taken from {}", records.size(), files.results));
+  earlierEvaluations_.emplace(parameters_->searchSpace(), *aggregator_, std::move(records));
+}
+
+std::vector<std::string> RunDriver::headLines() const {
+  return {config_.title, fmt::format("Mirevo {}", programVersion()), taskName(config_),
+          fmt::format("Random seed: {}", config_.randomSeed), "Setup file: " + config_.setupFile};
 }
 
 std::vector<std::string> RunDriver::closingLines(std::string_view terminationMessage) const {
@@ -199,6 +239,10 @@ void RunDriver::finish(const TaskOutcome& outcome) {
   state_.log.line("");
   state_.log.line(
       fmt::format("{} model evaluations, {} of them failed", reporter_->evaluationCount(), reporter_->failedCount()));
+  if (reporter_->replayedCount() > 0) {
+    state_.log.line(fmt::format("{} of them were taken from the earlier run", reporter_->replayedCount()));
+  }
+  logFailures();
   state_.log.line("");
   state_.log.line(kNormalTermination);
   if (!state_.log.writeError().empty()) {
@@ -210,12 +254,21 @@ void RunDriver::finish(const TaskOutcome& outcome) {
   state_.progress.progressEnd(kNormalTermination);
 }
 
+/// Which reasons the run's failures had, and how often.
+void RunDriver::logFailures() {
+  if (reporter_->failedCount() == 0) return;
+  state_.log.line("Why evaluations failed:");
+  for (const std::string& line : reporter_->failures().lines()) state_.log.line(line);
+}
+
 int RunDriver::endInError(std::string_view message, std::string_view detail) {
   std::string text(trimTrailing(message));
   if (!text.empty()) {
     if (!detail.empty()) text.append("\n").append(detail);
-    if (reporter_ && reporter_->failedCount() > 0) text += "\nfailed model runs are described in calSimErr.dat";
+    if (reporter_ && reporter_->failedCount() > 0)
+      text += fmt::format("\nfailed model runs are described in {}", kFailedRunFileName);
     state_.log.line("");
+    if (reporter_) logFailures();
     state_.log.line(text);
     showMessage(text);
   }

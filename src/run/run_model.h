@@ -1,5 +1,8 @@
 #pragma once
 
+#include <string>
+#include <vector>
+
 #include "evaluation/model_run.h"
 #include "platform/process_launcher.h"
 #include "run/run_config.h"
@@ -8,6 +11,10 @@ namespace mirevo {
 
 /// What turns a parameter set into a result, as the setup says.
 ModelDescription describeModel(const RunConfig& config);
+
+/// Removes the folders of failed model runs that an earlier run has kept. Returns a line for each that could not be
+/// removed.
+std::vector<std::string> removeFailedRunFolders(const RunConfig& config);
 
 /// How the model is launched in `slotCount` slots, whose process folders are numbered from `firstFolderNumber` on.
 LauncherSettings launcherSettings(const RunConfig& config, int slotCount, int firstFolderNumber = 1);
