@@ -1,9 +1,7 @@
 #include "run/run_driver.h"
 
 #include <filesystem>
-#include <map>
 #include <new>
-#include <set>
 #include <unistd.h>
 
 #include <fmt/format.h>
@@ -106,6 +104,9 @@ void RunDriver::openRun(const std::string& setupFileName) {
 void RunDriver::buildModel() {
   parameters_ = std::make_unique<ParameterModel>(config_.parameters, config_.constraints);
   aggregator_ = std::make_unique<ObjectiveAggregator>(config_.objectives, config_.aggregationMethod);
+  // Before the process folders are made anew: a run that cannot be taken up again leaves everything as it is.
+  results_.emplace(config_, parameters_->searchSpace(), filePrefix_);
+  config_.optimisation.earlierSearches = results_->earlierSearches();
   launcher_ = std::make_unique<PosixProcessLauncher>();
   signalState.haltProcesses = haltProcessesFromSignal;
   const int slotCount = state_.mpiInUse ? 0 : config_.simultaneousSimulations;  // the master runs no model
@@ -133,81 +134,17 @@ void RunDriver::logSetup() {
 
 void RunDriver::openResults() {
   state_.objectiveValues.resize(config_.objectives.size());
-  const SearchSpace& space = parameters_->searchSpace();
-  failedRunFile_ = std::make_unique<FailedRunFile>(
-      std::filesystem::path(filePrefix_).replace_filename(kFailedRunFileName).string(), config_.setupName, space.names);
-  const std::string_view ending = resultFileEnding(config_);
-  if (!ending.empty()) openResultFiles(filePrefix_ + std::string(ending));
-  reporter_ = std::make_unique<RunReporter>(state_, results_, *failedRunFile_, space,
-                                            simulatedValuesFile_ ? &*simulatedValuesFile_ : nullptr);
+  results_->open(config_, runner_->observedSeries(), *aggregator_, state_.log);
+  reporter_ = std::make_unique<RunReporter>(state_, results_->table(), results_->failedRuns(),
+                                            parameters_->searchSpace(), results_->simulatedValues());
   failedRunPolicy_.emplace(config_.plannedEvaluations(), config_.failedRunFolders);
-  EarlierEvaluations* const earlier = earlierEvaluations_ ? &*earlierEvaluations_ : nullptr;
+  EarlierEvaluations* const earlier = results_->earlierEvaluations();
   if (state_.mpiInUse) {
     evaluator_ = std::make_unique<MpiEvaluator>(*runner_, state_.mpi, *reporter_, *failedRunPolicy_, earlier);
   } else {
     evaluator_ = std::make_unique<LocalEvaluator>(*runner_, *reporter_, *failedRunPolicy_,
                                                   config_.simultaneousSimulations, earlier);
   }
-}
-
-void RunDriver::openResultFiles(const std::string& path) {
-  ResultColumns columns;
-  columns.parameters = parameters_->searchSpace().names;
-  for (const OutputMeasure& measure : config_.measures) columns.measures.push_back(measure.name);
-  for (const ObjectiveFunction& objective : config_.objectives) columns.objectives.push_back(objective.name);
-  const RestartFiles files = restartFiles(path);
-  if (keepsSimulatedValues(config_)) {
-    std::size_t count = 0;
-    for (const ObservedSeries& series : runner_->observedSeries()) count += series.values.size();
-    simulatedValuesFile_.emplace(files.simulatedValues, count);
-  }
-  auto earlier = config_.restart != 0 ? findEarlierRun(files, config_, columns) : std::nullopt;
-  if (earlier) return goOnFrom(*std::move(earlier), files, columns);
-  if (config_.restart != 0) state_.log.line("Restart: there are no earlier results to go on from, the run begins anew");
-  beginAnew(files);
-  std::vector<std::string> head = headLines();
-  head.push_back("Started: " + dateAndTimeNow());
-  results_.open(path, head, columns);
-}
-
-void RunDriver::beginAnew(const RestartFiles& files) {
-  keepEarlierFile(failedRunFile_->path());
-  if (const std::string kept = keepEarlierFile(files.results); !kept.empty()) {
-    state_.log.line("The results of the earlier run were kept as " + kept);
-  }
-  keepEarlierFile(files.settings);
-  keepEarlierFile(files.simulatedValues);
-  if (const std::string kept = keepEarlierFile(filePrefix_ + "_Saved"); !kept.empty()) {
-    state_.log.line("The saved output files of the earlier run were kept as " + kept);
-  }
-  for (const std::string& problem : removeFailedRunFolders(config_)) state_.log.warning(problem);
-  // Before there is a result, so that none is ever without the settings that it depends on.
-  writeRestartSettings(files.settings, config_);
-  if (simulatedValuesFile_) simulatedValuesFile_->create();
-}
-
-void RunDriver::goOnFrom(EarlierRun run, const RestartFiles& files, const ResultColumns& columns) {
-  config_.optimisation.earlierSearches = run.searches;
-  std::set<int> failed;
-  std::set<int> succeeded;
-  for (const ResultTable::Row& row : run.rows) (row.ok ? succeeded : failed).insert(row.number);
-  const std::map<int, EvaluationFailure> failures = failedRunFile_->takeUp(failed);
-  std::optional<std::map<int, std::vector<double>>> simulatedValues;
-  if (simulatedValuesFile_) simulatedValues = simulatedValuesFile_->takeUp(succeeded);
-  auto records = earlierRecords(run, columns, failures, std::move(simulatedValues));
-  std::vector<std::string> head = headLines();
-  head.insert(head.end(), run.history.begin(), run.history.end());
-  head.push_back("Restarted: " + dateAndTimeNow());
-  results_.open(files.results, head, columns, run.rows);
-  writeRestartSettings(files.settings, config_);
-  for (const std::string& note : run.notes) state_.log.line(note);
-  state_.log.line(fmt::format("Restart: {} evaluations are taken from {}", records.size(), files.results));
-  earlierEvaluations_.emplace(parameters_->searchSpace(), *aggregator_, std::move(records));
-}
-
-std::vector<std::string> RunDriver::headLines() const {
-  return {config_.title, fmt::format("Mirevo {}", programVersion()), taskName(config_),
-          fmt::format("Random seed: {}", config_.randomSeed), "Setup file: " + config_.setupFile};
 }
 
 std::vector<std::string> RunDriver::closingLines(std::string_view terminationMessage) const {
@@ -228,13 +165,13 @@ bool RunDriver::closeResults(std::string_view terminationMessage, std::string& r
   if (reporter_) reporter_->settle(*aggregator_);
   std::vector<std::string> lines = closingLines(terminationMessage);
   lines.insert(lines.end(), report.begin(), report.end());
-  return results_.finish(lines, reason);
+  return !results_ || results_->table().finish(lines, reason);
 }
 
 void RunDriver::finish(const TaskOutcome& outcome) {
   std::string reason;
   if (!closeResults(outcome.terminationMessage, reason, outcome.report)) {
-    fatalError("Error: Unable to write to " + results_.path(), reason);
+    fatalError("Error: Unable to write to " + results_->table().path(), reason);
   }
   state_.log.line("");
   state_.log.line(
@@ -281,7 +218,7 @@ int RunDriver::endCancelled(std::string_view message) {
   showMessage(message);
   std::string reason;
   if (!closeResults(message, reason)) {
-    state_.log.line(fmt::format("Error: Unable to write to {}\n{}", results_.path(), reason));
+    state_.log.line(fmt::format("Error: Unable to write to {}\n{}", results_->table().path(), reason));
   }
   return endEarly(message);
 }

@@ -6,21 +6,17 @@
 #include <string>
 #include <string_view>
 
-#include "evaluation/earlier_evaluations.h"
 #include "evaluation/evaluator.h"
 #include "evaluation/failed_run_policy.h"
 #include "evaluation/model_run.h"
 #include "measures/objective_functions.h"
 #include "parameters/parameter_model.h"
 #include "platform/process_launcher.h"
-#include "run/failed_run_file.h"
-#include "run/restart.h"
-#include "run/result_file.h"
 #include "run/run_config.h"
 #include "run/run_lock.h"
 #include "run/run_reporter.h"
+#include "run/run_results.h"
 #include "run/run_state.h"
-#include "run/simulated_values_file.h"
 #include "run/tasks.h"
 
 namespace mirevo {
@@ -42,12 +38,6 @@ class RunDriver final {
   void buildModel();
   void logSetup();
   void openResults();
-  /// Opens the result file and all that belongs to it, behind the results of an earlier run where the setup asks to go
-  /// on from it.
-  void openResultFiles(const std::string& path);
-  void beginAnew(const RestartFiles& files);
-  void goOnFrom(EarlierRun run, const RestartFiles& files, const ResultColumns& columns);
-  std::vector<std::string> headLines() const;
   /// False, with the system's reason, when the results could not be brought to their end. `report`: what the task
   /// found.
   bool closeResults(std::string_view terminationMessage, std::string& reason, std::span<const std::string> report = {});
@@ -65,12 +55,9 @@ class RunDriver final {
   RunLock lock_;
   std::string filePrefix_;  ///< folder and name of the setup, without ".kdx": the run's files begin with it
   RunConfig config_;
-  ResultFile results_;
   std::unique_ptr<ParameterModel> parameters_;
   std::unique_ptr<ObjectiveAggregator> aggregator_;
-  std::unique_ptr<FailedRunFile> failedRunFile_;
-  std::optional<SimulatedValuesFile> simulatedValuesFile_;  ///< where the task works with simulated values
-  std::optional<EarlierEvaluations> earlierEvaluations_;
+  std::optional<RunResults> results_;
   std::unique_ptr<RunReporter> reporter_;
   std::optional<FailedRunPolicy> failedRunPolicy_;
   std::unique_ptr<ProcessLauncher> launcher_;

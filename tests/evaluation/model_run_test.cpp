@@ -220,8 +220,8 @@ TEST_F(ModelRunTest, SavedFilesAreThoseThatTheRunWrote) {
   std::filesystem::rename(folder_ / "run_Saved", folder_ / "other");
   folder_.write("run_Saved", "");
   runner_->keepOutputFiles(1, 9, result);
-  EXPECT_THAT(result.warnings, testing::Contains((folder_ / "run_Process1/simulated.csv") + " was not kept: " +
-                                                 (folder_ / "run_Saved/9") + ": Not a directory"));
+  EXPECT_THAT(result.warnings, testing::Contains((folder_ / "run_Process1/simulated.csv") +
+                                                 " was not kept: " + (folder_ / "run_Saved/9") + ": Not a directory"));
 }
 
 TEST_F(ModelRunTest, NumericIdTemplatesAreConvertedIntoTheSlotsAlone) {
