@@ -322,8 +322,11 @@ void PosixProcessLauncher::endOverdue(Slot& slot) {
 
 /// Until a running slot's batch has to be looked at though it has not ended.
 double PosixProcessLauncher::secondsToLook(const Slot& slot) const {
-  if (slot.overdue) return *slot.overdue + graceSeconds_ - clock_();
-  return maxSeconds_ > 0.0 ? slot.started + maxSeconds_ - clock_() : std::numeric_limits<double>::infinity();
+  constexpr double kNever = std::numeric_limits<double>::infinity();
+  constexpr double kShortest = 0.001;
+  if (!slot.overdue) return maxSeconds_ > 0.0 ? std::max(slot.started + maxSeconds_ - clock_(), kShortest) : kNever;
+  const double grace = *slot.overdue + graceSeconds_ - clock_();
+  return grace > 0.0 ? std::max(grace, kShortest) : kNever;  // killed: its end is all there is to wait for
 }
 
 /// Reaps the group's ended first process and ends what it left behind. The group is stopped first, so that between
@@ -373,12 +376,11 @@ std::vector<std::string> PosixProcessLauncher::lastOutput(int slot, int lineCoun
 }
 
 void PosixProcessLauncher::waitForChange(double seconds) {
-  constexpr double kShortest = 0.001;  // never spinning on a batch that is slow to die
   std::vector<pollfd> watched;
   for (const Slot& slot : slots_) {
     if (slot.pidfd < 0) continue;
     watched.push_back({slot.pidfd, POLLIN, 0});
-    seconds = std::min(seconds, std::max(secondsToLook(slot), kShortest));
+    seconds = std::min(seconds, secondsToLook(slot));
   }
   if (watched.empty()) return;
   const double whole = std::floor(std::max(seconds, 0.0));

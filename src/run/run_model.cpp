@@ -8,6 +8,7 @@
 
 #include <fmt/format.h>
 
+#include "common/text.h"
 #include "run/tasks.h"
 
 namespace mirevo {
@@ -45,7 +46,7 @@ ModelDescription describeModel(const RunConfig& config) {
   return model;
 }
 
-std::vector<std::string> removeFailedRunFolders(const RunConfig& config) {
+std::vector<std::string> removeFailedRunFolders(const RunConfig& config, const std::set<int>& numbers) {
   const std::filesystem::path prefix(folderPrefix(config) + "_Failed");
   const std::string beginning = prefix.filename().string();
   std::vector<std::string> problems;
@@ -53,9 +54,11 @@ std::vector<std::string> removeFailedRunFolders(const RunConfig& config) {
   std::filesystem::directory_iterator entry(prefix.parent_path(), failed);
   for (; !failed && entry != std::filesystem::directory_iterator(); entry.increment(failed)) {
     const std::string name = entry->path().filename().string();
-    const bool isKept = name.size() > beginning.size() && name.starts_with(beginning) &&
-                        name.find_first_not_of("0123456789", beginning.size()) == std::string::npos;
-    if (!isKept) continue;
+    if (!name.starts_with(beginning)) continue;
+    const std::string digits = name.substr(beginning.size());
+    const auto number = parseInteger(digits);
+    const bool isMade = number && std::to_string(*number) == digits;
+    if (!isMade || numbers.count(*number) > 0) continue;
     std::error_code reason;
     std::filesystem::remove_all(entry->path(), reason);
     if (reason) problems.push_back(fmt::format("{} was not removed: {}", entry->path().string(), reason.message()));

@@ -74,7 +74,7 @@ void RunResults::beginAnew(const RunConfig& config, RunLog& log) {
   if (const std::string kept = keepEarlierFile(filePrefix_ + "_Saved"); !kept.empty()) {
     log.line("The saved output files of the earlier run were kept as " + kept);
   }
-  for (const std::string& problem : removeFailedRunFolders(config)) log.warning(problem);
+  for (const std::string& problem : removeFailedRunFolders(config, {})) log.warning(problem);
   // Before there is a result, so that none is ever without the settings that it depends on.
   writeRestartSettings(files_->settings, config);
   if (simulatedValues_) simulatedValues_->create();
@@ -89,6 +89,7 @@ void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggreg
   std::set<int> succeeded;
   for (const ResultTable::Row& row : run.rows) (row.ok ? succeeded : failed).insert(row.number);
   const std::map<int, EvaluationFailure> failures = failedRuns_.takeUp(failed);
+  for (const std::string& problem : removeFailedRunFolders(config, failed)) log.warning(problem);
   std::optional<std::map<int, std::vector<double>>> values;
   if (simulatedValues_) values = simulatedValues_->takeUp(succeeded);
   auto records = earlierRecords(run, columns_, failures, std::move(values));

@@ -312,6 +312,7 @@ TEST_F(Restart, FailuresThatEndedARunAreMadeAgainWhenAsked) {
   EXPECT_EQ(readResults(results()).rows.size(), 31U);
   EXPECT_THAT(results(), Not(HasSubstr("FAILED")));
   EXPECT_EQ(folder_.read("calSimErr.dat"), "# Failed evaluations of basin\n");
+  EXPECT_FALSE(folder_.exists("basin_Failed2"));
 }
 
 }  // namespace
