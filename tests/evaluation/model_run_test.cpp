@@ -169,7 +169,7 @@ TEST_F(ModelRunTest, ARunThatMeetsFewerObservationsThanAnyBeforeIsNamedInAWarnin
   FailedRunPolicy failedRuns(10);
   EvaluationLedger ledger(observer_, failedRuns);
   const std::vector<ParameterSet> sets(std::size(cases), {2.0});
-  ledger.begin(sets);
+  ledger.begin(sets, DispatchMode::task);
   std::string last;
   for (const auto& c : cases) {
     writes("simulated.csv", std::string("time,flow\n") + c.simulated);
