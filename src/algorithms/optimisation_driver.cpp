@@ -36,10 +36,11 @@ std::string progressLine(const SearchSummary& summary) {
 
 }  // namespace
 
-SearchSummary runSearch(SearchAlgorithm& search, std::string_view algorithm, const PeriodicStep& periodicStep) {
+SearchSummary runSearch(SearchAlgorithm& search, std::string_view algorithm, const PeriodicStep& periodicStep,
+                        int evaluationLimit) {
   try {
     checkStatus(search.initialise(), algorithm);
-    while (!search.isTerminated()) {
+    while (!search.isTerminated() && search.summary().evaluationCount < evaluationLimit) {
       checkStatus(search.advance(), algorithm);
       const bool isTimeForReport = search.isTerminated() || search.summary().loopCount % kLoopsBetweenReports == 0;
       if (isTimeForReport && periodicStep) periodicStep(progressLine(search.summary()));

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <functional>
+#include <limits>
 #include <string>
 #include <string_view>
 
@@ -16,7 +17,9 @@ using PeriodicStep = std::function<void(std::string_view line)>;
 /// Drives a search from its initial sample to its end and returns what it found. `algorithm` ("SCE", "PSE" or "DDS")
 /// stands in the message of the FatalError that a step with a status other than 0 throws, "Error: Invalid operation in
 /// SCE algorithm". Throws FatalError "Error: Unable to allocate memory", too, and what the evaluator throws.
-SearchSummary runSearch(SearchAlgorithm& search, std::string_view algorithm, const PeriodicStep& periodicStep);
+/// With `evaluationLimit` it ends as soon as so many evaluations are made, though the search itself would go on.
+SearchSummary runSearch(SearchAlgorithm& search, std::string_view algorithm, const PeriodicStep& periodicStep,
+                        int evaluationLimit = std::numeric_limits<int>::max());
 
 enum class PopulationAlgorithm { sce, pse };
 

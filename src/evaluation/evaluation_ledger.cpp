@@ -6,14 +6,33 @@
 
 namespace mirevo {
 
-void EvaluationLedger::begin(std::span<const ParameterSet> sets) {
+void EvaluationLedger::begin(std::span<const ParameterSet> sets, DispatchMode mode) {
   sets_ = sets;
   results_.assign(sets.size(), {});
+  isFinished_.assign(sets.size(), false);
   next_ = 0;
   finishedCount_ = 0;
+  if (earlier_ == nullptr || mode == DispatchMode::finalRun) return;
+  for (std::size_t place = 0; place < sets.size(); ++place) {
+    if (auto result = earlier_->take(numberOf(place), sets[place])) replay(place, std::move(*result));
+  }
+}
+
+void EvaluationLedger::replay(std::size_t place, EvaluationResult result) {
+  observer_.evaluationReplayed(sets_[place], result);
+  store(place, std::move(result));
+}
+
+/// Counts a result that was reported.
+void EvaluationLedger::store(std::size_t place, EvaluationResult result) {
+  if (!result.ok()) failedRuns_.countFailure(result.number, *result.failure);
+  results_[place] = std::move(result);
+  isFinished_[place] = true;
+  ++finishedCount_;
 }
 
 std::optional<std::size_t> EvaluationLedger::takeNext() {
+  while (next_ < sets_.size() && isFinished_[next_]) ++next_;
   if (next_ == sets_.size()) return std::nullopt;
   return next_++;
 }
@@ -38,10 +57,12 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
                   : "Evaluation of parameter set No. % completed: FAILED - model run error";
   }
   observer_.message(withNumber(outcome, result.number));
+  if (earlier_ != nullptr) {
+    // A repeated run has its row already, which stands.
+    if (auto known = earlier_->take(result.number, sets_[place])) return replay(place, std::move(*known));
+  }
   observer_.evaluationFinished(sets_[place], result);
-  if (!result.ok()) failedRuns_.countFailure(result.number, *result.failure);
-  results_[place] = std::move(result);
-  ++finishedCount_;
+  store(place, std::move(result));
 }
 
 void EvaluationLedger::warnOfUnusedObservations(const EvaluationResult& result) {
@@ -56,6 +77,7 @@ void EvaluationLedger::warnOfUnusedObservations(const EvaluationResult& result) 
 std::vector<EvaluationResult> EvaluationLedger::end() {
   evaluationCount_ += static_cast<int>(sets_.size());
   sets_ = {};
+  isFinished_.clear();
   next_ = 0;
   finishedCount_ = 0;
   return std::exchange(results_, {});

@@ -8,8 +8,10 @@
 #include <vector>
 
 #include "common/parameter_set.h"
+#include "evaluation/earlier_evaluations.h"
 #include "evaluation/evaluation_observer.h"
 #include "evaluation/evaluation_result.h"
+#include "evaluation/evaluator.h"
 #include "evaluation/failed_run_policy.h"
 #include "measures/objective_functions.h"
 
@@ -19,12 +21,15 @@ namespace mirevo {
 /// said and recorded about it, what counts as failed, and the results in the order of the sets.
 class EvaluationLedger final {
  public:
-  EvaluationLedger(EvaluationObserver& observer, FailedRunPolicy& failedRuns)
-      : observer_(observer), failedRuns_(failedRuns) {}
+  /// `earlier`: evaluations that are not to be made again; may be null.
+  EvaluationLedger(EvaluationObserver& observer, FailedRunPolicy& failedRuns, EarlierEvaluations* earlier = nullptr)
+      : observer_(observer), failedRuns_(failedRuns), earlier_(earlier) {}
 
   /// Opens the next batch of the run; its sets are known by their 0-based place in it. `sets` must outlive the batch.
-  void begin(std::span<const ParameterSet> sets);
-  /// The next set in their order, nothing when all are taken.
+  /// Sets that an earlier run has evaluated get their results at once, unless their model runs are wanted. Throws
+  /// FatalError past the failed-run limit, and for an earlier evaluation of another set.
+  void begin(std::span<const ParameterSet> sets, DispatchMode mode);
+  /// The next set in their order that has no result yet, nothing when all are taken.
   std::optional<std::size_t> takeNext();
   const ParameterSet& set(std::size_t place) const { return sets_[place]; }
   /// The set's number in the run, from 1.
@@ -34,6 +39,10 @@ class EvaluationLedger final {
   /// The set has its result, whose number is filled in here. `leftBehind`: what the launcher says of processes that
   /// had to be ended, or empty. Throws FatalError past the failed-run limit.
   void finish(std::size_t place, EvaluationResult result, std::string_view leftBehind = {});
+  /// Whether the process folder of this result's run is to be kept; to be asked before it is finished.
+  bool isFolderWanted(const EvaluationResult& result) const {
+    return !result.ok() && failedRuns_.isFolderWanted(*result.failure);
+  }
   bool isComplete() const { return finishedCount_ == sets_.size(); }
   /// Closes a complete batch: one result a set, in their order.
   std::vector<EvaluationResult> end();
@@ -41,11 +50,15 @@ class EvaluationLedger final {
  private:
   /// A warning for each measure that a run judged by fewer observations than any run before it.
   void warnOfUnusedObservations(const EvaluationResult& result);
+  void replay(std::size_t place, EvaluationResult result);
+  void store(std::size_t place, EvaluationResult result);
 
   EvaluationObserver& observer_;
   FailedRunPolicy& failedRuns_;
+  EarlierEvaluations* earlier_;
   std::span<const ParameterSet> sets_;
   std::vector<EvaluationResult> results_;
+  std::vector<bool> isFinished_;                   ///< whether a set has its result
   std::size_t next_ = 0;                           ///< first set that was not taken
   std::size_t finishedCount_ = 0;                  ///< sets that have a result
   int evaluationCount_ = 0;                        ///< sets of the batches before this one

@@ -22,6 +22,10 @@ class EvaluationObserver {
   virtual void warning(std::string_view text) = 0;
   /// An evaluation has finished, in order of arrival; `set` is on the search scale. Called before its result is used.
   virtual void evaluationFinished(std::span<const double> set, const EvaluationResult& result) = 0;
+  /// An evaluation has its result from an earlier run and not from the model. It counts like any other.
+  virtual void evaluationReplayed(std::span<const double> set, const EvaluationResult& result) {
+    evaluationFinished(set, result);
+  }
   /// Whether an outside party wants the run to stop. Once true it stays true.
   virtual bool isCancelled() = 0;
 };

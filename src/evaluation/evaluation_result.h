@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <optional>
 #include <string>
+#include <string_view>
 #include <vector>
 
 namespace mirevo {
@@ -23,11 +24,20 @@ struct EvaluationFailure {
     resultsNotWritten,
     resultsNotReadable,
     resultNotFinite,
+    notKnown,  ///< of an earlier run, whose evidence is gone
   };
   Kind kind = Kind::exitCode;
   std::string reason;                   ///< one line for a person
   std::vector<std::string> lastOutput;  ///< the last lines that the batch printed
+
+  /// Whether the model was run, or was to be: its folder may then tell more.
+  bool isOfModelRun() const { return kind != Kind::constraintsViolated && kind != Kind::equationNotFinite; }
 };
+
+/// What a kind of failure is called, "batch ran too long".
+std::string_view failureKindName(EvaluationFailure::Kind kind);
+/// The kind of that name; nothing for another text.
+std::optional<EvaluationFailure::Kind> failureKindCalled(std::string_view name);
 
 /// A measure some of whose observations the model run has no value for; the rest of them is what was judged.
 struct UnusedObservations {

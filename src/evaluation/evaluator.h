@@ -8,8 +8,9 @@
 
 namespace mirevo {
 
-/// What a batch is for: the sets of a task, or points that a surrogate model has selected.
-enum class DispatchMode : int { task = 0, surrogateSelected = 1 };
+/// What a batch is for: the sets of a task, points that a surrogate model has selected, or sets whose model run itself
+/// is wanted for the folder that it leaves, even where an earlier run has its result.
+enum class DispatchMode : int { task = 0, surrogateSelected = 1, finalRun = 2 };
 
 /// The one way in which any task has parameter sets evaluated.
 class Evaluator {

@@ -7,6 +7,7 @@
 namespace mirevo {
 
 void FailedRunPolicy::countFailure(int number, const EvaluationFailure& failure) {
+  if (isFolderWanted(failure)) --foldersLeft_;
   ++failedCount_;
   if (failedCount_ <= limit_) return;
   std::string detail = fmt::format(

@@ -8,15 +8,17 @@
 namespace mirevo {
 
 LocalEvaluator::LocalEvaluator(ModelRunner& runner, EvaluationObserver& observer, FailedRunPolicy& failedRuns,
-                               int slotCount)
-    : runner_(runner), observer_(observer), ledger_(observer, failedRuns), slots_(static_cast<std::size_t>(slotCount)) {
+                               int slotCount, EarlierEvaluations* earlier)
+    : runner_(runner),
+      observer_(observer),
+      ledger_(observer, failedRuns, earlier),
+      slots_(static_cast<std::size_t>(slotCount)) {
   assert(slotCount > 0);
 }
 
 std::vector<EvaluationResult> LocalEvaluator::evaluateParameterSets(std::span<const ParameterSet> sets,
                                                                     DispatchMode mode) {
-  static_cast<void>(mode);  // a set is run the same way, whatever it is for
-  ledger_.begin(sets);
+  ledger_.begin(sets, mode);
   for (int slot = 1; slot <= static_cast<int>(slots_.size()); ++slot) startNext(slot);
   while (!ledger_.isComplete()) {
     if (!takeFinished()) runner_.launcher().waitForChange(kPollSeconds);
@@ -52,6 +54,7 @@ bool LocalEvaluator::takeFinished() {
     running.reset();
     EvaluationResult result = runner_.collect(slot);
     runner_.keepOutputFiles(slot, ledger_.numberOf(place), result);
+    if (ledger_.isFolderWanted(result)) runner_.keepFailedFolder(slot, ledger_.numberOf(place), result.warnings);
     ledger_.finish(place, std::move(result), runner_.launcher().leftBehind(slot));
     startNext(slot);
   }

@@ -18,7 +18,9 @@ inline constexpr double kPollSeconds = 0.5;
 /// Runs the model in local slots, several at once.
 class LocalEvaluator final : public Evaluator {
  public:
-  LocalEvaluator(ModelRunner& runner, EvaluationObserver& observer, FailedRunPolicy& failedRuns, int slotCount);
+  /// `earlier`: evaluations that are not to be made again; may be null. All must outlive this.
+  LocalEvaluator(ModelRunner& runner, EvaluationObserver& observer, FailedRunPolicy& failedRuns, int slotCount,
+                 EarlierEvaluations* earlier = nullptr);
 
   std::vector<EvaluationResult> evaluateParameterSets(std::span<const ParameterSet> sets, DispatchMode mode) override;
   void settleAggregates(std::span<EvaluationResult> sample) override;

@@ -17,6 +17,8 @@
 #include "common/files.h"
 #include "common/text.h"
 #include "measures/measure_file.h"
+#include "platform/file_copy.h"
+#include "platform/process_folder.h"
 
 namespace mirevo {
 namespace {
@@ -33,6 +35,8 @@ EvaluationFailure::Kind failureKind(BatchFailure::Kind kind) {
       return Kind::signal;
     case BatchFailure::Kind::couldNotStart:
       return Kind::couldNotStart;
+    case BatchFailure::Kind::timedOut:
+      return Kind::timedOut;
     default:
       return Kind::exitCode;
   }
@@ -79,7 +83,11 @@ bool exists(const std::string& path) {
 
 ModelRunner::ModelRunner(ModelDescription description, ParameterModel& parameters, ObjectiveAggregator& aggregator,
                          ProcessLauncher& launcher, const LauncherSettings& launcherSettings)
-    : description_(std::move(description)), parameters_(parameters), aggregator_(aggregator), launcher_(launcher) {
+    : description_(std::move(description)),
+      parameters_(parameters),
+      aggregator_(aggregator),
+      launcher_(launcher),
+      processFolderPrefix_(launcherSettings.processFolderPrefix) {
   requireFilesInBaseFolder();
   const std::vector<std::string> converted = readTemplates();
   series_ = SeriesTables::MirevoTSobjectInit(description_.measures, description_.period);
@@ -216,6 +224,20 @@ void ModelRunner::keepOutputFiles(int slot, int number, EvaluationResult& result
   for (std::string& problem : savedFiles_.save(launcher_.getProcessFolder(slot), number)) {
     result.warnings.push_back(std::move(problem));
   }
+}
+
+void ModelRunner::keepFailedFolder(int slot, int number, std::vector<std::string>& warnings) const {
+  const std::string folder = launcher_.getProcessFolder(slot);
+  const std::string kept = fmt::format("{}{}", description_.failedFolderPrefix, number);
+  std::string reason;
+  try {
+    makeProcessFolder(folder, kept, processFolderPrefix_);
+    const std::string log = std::string("/") + kBatchLogName;  // no part of the model, so not copied with it
+    if (!exists(folder + log) || copyWhole(folder + log, kept + log, reason)) return;
+  } catch (const FatalError& error) {
+    reason = error.message();
+  }
+  warnings.push_back(fmt::format("The folder of this run was not kept as {}: {}", kept, reason));
 }
 
 EvaluationResult ModelRunner::failedResult(EvaluationFailure failure) const {

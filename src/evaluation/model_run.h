@@ -29,6 +29,7 @@ struct ModelDescription {
   std::vector<ObjectiveFunction> objectives;
   std::vector<std::string> savedFiles;  ///< kept of every model run
   std::string savedFolder;              ///< where they are kept
+  std::string failedFolderPrefix;       ///< a failed run's folder is kept as this text and the evaluation's number
   bool keepSimulatedValues = false;     ///< results hold the simulated values at the observation times
 };
 
@@ -56,6 +57,10 @@ class ModelRunner final {
   /// Keeps the output files of the slot's run, whose evaluation has that number; `result` is given warnings for what
   /// could not be kept. To be called before the slot's next run.
   void keepOutputFiles(int slot, int number, EvaluationResult& result) const;
+
+  /// Keeps a copy of the slot's folder, whose run has failed, for a person to look at; `warnings` is given a line when
+  /// that is not possible.
+  void keepFailedFolder(int slot, int number, std::vector<std::string>& warnings) const;
 
   /// A result with the failed-run value in every field.
   EvaluationResult failedResult(EvaluationFailure failure) const;
@@ -91,6 +96,7 @@ class ModelRunner final {
   ParameterModel& parameters_;
   ObjectiveAggregator& aggregator_;
   ProcessLauncher& launcher_;
+  std::string processFolderPrefix_;
   std::vector<ParameterTemplate> templates_;  ///< one a parameter file
   SeriesTables series_;
   SavedFiles savedFiles_;

@@ -20,17 +20,16 @@ void sendToWorkers(MessageChannel& channel, RankMessage tag, const std::string& 
 }  // namespace
 
 MpiEvaluator::MpiEvaluator(ModelRunner& runner, MessageChannel& channel, EvaluationObserver& observer,
-                           FailedRunPolicy& failedRuns)
+                           FailedRunPolicy& failedRuns, EarlierEvaluations* earlier)
     : runner_(runner),
       channel_(channel),
       observer_(observer),
-      ledger_(observer, failedRuns),
+      ledger_(observer, failedRuns, earlier),
       workers_(static_cast<std::size_t>(channel.processCount() - 1)) {}
 
 std::vector<EvaluationResult> MpiEvaluator::evaluateParameterSets(std::span<const ParameterSet> sets,
                                                                   DispatchMode mode) {
-  static_cast<void>(mode);  // a set is run the same way, whatever it is for
-  ledger_.begin(sets);
+  ledger_.begin(sets, mode);
   startOnFreeWorkers();
   while (!ledger_.isComplete()) {
     const auto message = channel_.receive(kMasterPollSeconds);
@@ -89,6 +88,9 @@ void MpiEvaluator::takeResult(int rank, ResultMessage message) {
   EvaluationResult& result = message.result;
   // Only here is the transformation known that was settled by the initial sample.
   if (result.ok()) result.aggregate = runner_.aggregator().aggregate(result.objectiveValues);
+  if (ledger_.isFolderWanted(result)) {
+    channel_.send(rank, static_cast<int>(RankMessage::keepFolder), encode(KeepFolderMessage{ledger_.numberOf(*place)}));
+  }
   ledger_.finish(*place, std::move(result), message.leftBehind);
 }
 

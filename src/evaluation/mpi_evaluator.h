@@ -18,7 +18,9 @@ namespace mirevo {
 class MpiEvaluator final : public Evaluator {
  public:
   /// `runner` has no slots here; it knows which sets cannot be run. The workers have been told to begin.
-  MpiEvaluator(ModelRunner& runner, MessageChannel& channel, EvaluationObserver& observer, FailedRunPolicy& failedRuns);
+  /// `earlier`: evaluations that are not to be made again; may be null. All must outlive this.
+  MpiEvaluator(ModelRunner& runner, MessageChannel& channel, EvaluationObserver& observer, FailedRunPolicy& failedRuns,
+               EarlierEvaluations* earlier = nullptr);
 
   /// Throws FatalError with the worker's own message when one of them has met a fatal error.
   std::vector<EvaluationResult> evaluateParameterSets(std::span<const ParameterSet> sets, DispatchMode mode) override;

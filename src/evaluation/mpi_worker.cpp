@@ -61,12 +61,20 @@ std::optional<ResultMessage> runModel(MessageChannel& channel, ModelRunner& runn
 void runWorkerLoop(MessageChannel& channel, ModelRunner& runner) {
   sendToMaster(channel, RankMessage::ready,
                encode(ReadyMessage{hostName(), runner.launcher().getProcessFolder(kSlot)}));
+  std::vector<std::string> warnings;  // of what was done since the last result, told with the next one
   while (true) {
     const Message message = await(channel);
     if (message.tag == static_cast<int>(RankMessage::stop)) return;
+    if (message.tag == static_cast<int>(RankMessage::keepFolder)) {
+      runner.keepFailedFolder(kSlot, decodeKeepFolder(message.content).number, warnings);
+      continue;
+    }
     if (message.tag != static_cast<int>(RankMessage::set)) refuse(message);
-    const auto result = runModel(channel, runner, decodeSet(message.content));
+    auto result = runModel(channel, runner, decodeSet(message.content));
     if (!result) return;
+    std::vector<std::string>& told = result->result.warnings;
+    told.insert(told.begin(), warnings.begin(), warnings.end());
+    warnings.clear();
     sendToMaster(channel, RankMessage::result, encode(*result));
   }
 }

@@ -32,6 +32,10 @@ struct Layout<ResultMessage> {
   static void of(auto& archive, auto& message) { archive(message.result, message.leftBehind); }
 };
 template <>
+struct Layout<KeepFolderMessage> {
+  static void of(auto& archive, auto& message) { archive(message.number); }
+};
+template <>
 struct Layout<FailureMessage> {
   static void of(auto& archive, auto& message) { archive(message.message, message.detail); }
 };
@@ -205,6 +209,14 @@ std::string encode(const ResultMessage& message) {
 
 ResultMessage decodeResult(std::string_view content) {
   return read<ResultMessage>(content);
+}
+
+std::string encode(const KeepFolderMessage& message) {
+  return written(message);
+}
+
+KeepFolderMessage decodeKeepFolder(std::string_view content) {
+  return read<KeepFolderMessage>(content);
 }
 
 std::string encode(const FailureMessage& message) {

@@ -15,11 +15,12 @@ namespace mirevo {
 ///     | <-------------- ready (place)  |
 ///     | set -------------------------> |  runs the model                            as often as there are sets
 ///     | <-------------------- result   |
+///     | keep folder ----------------> |  after a failed run, where its folder is evidence to keep
 ///     | stop ------------------------> |  at any time; ends its model's processes
 ///     | <------------------ farewell   |  then both finalise MPI
 ///
 /// A worker that meets a fatal error sends `failure` at any time and waits for `stop`.
-enum class RankMessage : int { begin = 1, set, stop, ready, result, failure, farewell };
+enum class RankMessage : int { begin = 1, set, stop, ready, result, failure, farewell, keepFolder };
 
 /// The master's setup file as it read it, so that all ranks work from the same text.
 struct BeginMessage {
@@ -44,6 +45,11 @@ struct ResultMessage {
   std::string leftBehind;  ///< what the launcher has to say about processes that had to be ended, or empty
 };
 
+/// The worker's last run is one whose folder is to be kept.
+struct KeepFolderMessage {
+  int number = 0;  ///< of its evaluation
+};
+
 struct FailureMessage {
   std::string message;
   std::string detail;
@@ -60,6 +66,8 @@ std::string encode(const ReadyMessage& message);
 ReadyMessage decodeReady(std::string_view content);
 std::string encode(const ResultMessage& message);
 ResultMessage decodeResult(std::string_view content);
+std::string encode(const KeepFolderMessage& message);
+KeepFolderMessage decodeKeepFolder(std::string_view content);
 std::string encode(const FailureMessage& message);
 FailureMessage decodeFailure(std::string_view content);
 

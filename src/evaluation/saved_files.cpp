@@ -43,6 +43,10 @@ void SavedFiles::markAsOld(const std::string& processFolder) const {
 
 std::vector<std::string> SavedFiles::save(const std::string& processFolder, int number) const {
   std::vector<std::string> problems;
+  if (names_.empty()) return problems;
+  // What an interrupted run has kept of this evaluation is not this run's.
+  std::error_code ignored;
+  std::filesystem::remove_all(fmt::format("{}/{}", folder_, number), ignored);
   for (const std::string& name : names_) {
     const std::string source = processFolder + name;
     const std::string target = fmt::format("{}/{}{}", folder_, number, name);

@@ -11,6 +11,7 @@
 #include <ctime>
 #include <fcntl.h>
 #include <filesystem>
+#include <limits>
 #include <new>
 #include <optional>
 #include <poll.h>
@@ -111,6 +112,10 @@ std::string printable(std::string_view line) {
 
 }  // namespace
 
+double monotonicSeconds() {
+  return std::chrono::duration<double>(Clock::now().time_since_epoch()).count();
+}
+
 PosixProcessLauncher::~PosixProcessLauncher() {
   haltProcesses();
   closeDescriptors();
@@ -133,6 +138,7 @@ bool PosixProcessLauncher::initialise(const LauncherSettings& settings) {
   // Where the program was started with this signal ignored, the kernel would forget how its children ended.
   ::signal(SIGCHLD, SIG_DFL);
   graceSeconds_ = settings.graceSeconds;
+  maxSeconds_ = settings.maxSeconds;
   try {
     std::vector<std::vector<std::string>> arguments;
     for (const BatchItem& item : settings.batchItems) {
@@ -233,6 +239,8 @@ void PosixProcessLauncher::createProcesses(int slotNumber) {
   slot.item = 0;
   slot.failure = {};
   slot.leftBehind.clear();
+  slot.started = clock_();
+  slot.overdue.reset();
   if (!renewLog(slot)) {
     slot.failure = {
         BatchFailure::Kind::couldNotStart, errno,
@@ -267,6 +275,8 @@ void PosixProcessLauncher::isExecuting(int slotNumber, std::int32_t& executing, 
     const int result = ::waitid(P_PIDFD, static_cast<id_t>(slot.pidfd), &ended, WEXITED | WNOHANG | WNOWAIT);
     if (result == 0 && ended.si_pid != 0) {
       finishItem(slot, ended.si_code, ended.si_status);
+    } else if (result == 0) {
+      endOverdue(slot);
     } else if (result < 0 && errno == ECHILD) {  // something else in this program has reaped it
       endRestOfGroup(slot);
       slot.failure = {BatchFailure::Kind::exitCode, -1,
@@ -282,7 +292,10 @@ void PosixProcessLauncher::isExecuting(int slotNumber, std::int32_t& executing, 
 void PosixProcessLauncher::finishItem(Slot& slot, int code, int status) {
   endRestOfGroup(slot);
   const std::string name = baseName(slot.commands[slot.item].file());
-  if (code != CLD_EXITED) {
+  if (slot.overdue) {  // however it took its end
+    slot.failure = {BatchFailure::Kind::timedOut, 0,
+                    fmt::format("{} was ended because it ran longer than {:g} seconds", name, maxSeconds_)};
+  } else if (code != CLD_EXITED) {
     const char* description = ::sigdescr_np(status);
     slot.failure = {BatchFailure::Kind::signal, status,
                     fmt::format("{} was ended by signal {}{}", name, status,
@@ -293,6 +306,27 @@ void PosixProcessLauncher::finishItem(Slot& slot, int code, int status) {
     ++slot.item;
     startItem(slot);
   }
+}
+
+/// Ends a batch that has run for too long, without waiting for it: SIGTERM first, and SIGKILL when it has not ended
+/// within the grace time.
+void PosixProcessLauncher::endOverdue(Slot& slot) {
+  const double now = clock_();
+  if (slot.overdue) {
+    if (now - *slot.overdue >= graceSeconds_) ::kill(-slot.group, SIGKILL);
+  } else if (maxSeconds_ > 0.0 && now - slot.started > maxSeconds_) {
+    slot.overdue = now;
+    ::kill(-slot.group, SIGTERM);
+  }
+}
+
+/// Until a running slot's batch has to be looked at though it has not ended.
+double PosixProcessLauncher::secondsToLook(const Slot& slot) const {
+  constexpr double kNever = std::numeric_limits<double>::infinity();
+  constexpr double kShortest = 0.001;
+  if (!slot.overdue) return maxSeconds_ > 0.0 ? std::max(slot.started + maxSeconds_ - clock_(), kShortest) : kNever;
+  const double grace = *slot.overdue + graceSeconds_ - clock_();
+  return grace > 0.0 ? std::max(grace, kShortest) : kNever;  // killed: its end is all there is to wait for
 }
 
 /// Reaps the group's ended first process and ends what it left behind. The group is stopped first, so that between
@@ -344,7 +378,9 @@ std::vector<std::string> PosixProcessLauncher::lastOutput(int slot, int lineCoun
 void PosixProcessLauncher::waitForChange(double seconds) {
   std::vector<pollfd> watched;
   for (const Slot& slot : slots_) {
-    if (slot.pidfd >= 0) watched.push_back({slot.pidfd, POLLIN, 0});
+    if (slot.pidfd < 0) continue;
+    watched.push_back({slot.pidfd, POLLIN, 0});
+    seconds = std::min(seconds, secondsToLook(slot));
   }
   if (watched.empty()) return;
   const double whole = std::floor(std::max(seconds, 0.0));

@@ -1,9 +1,12 @@
 #pragma once
 
 #include <atomic>
+#include <functional>
 #include <memory>
+#include <optional>
 #include <string>
 #include <sys/types.h>
+#include <utility>
 #include <vector>
 
 #include "platform/child_guard.h"
@@ -14,13 +17,19 @@
 
 namespace mirevo {
 
+/// Seconds since some moment in the past, not moved by changes of the time of day.
+double monotonicSeconds();
+
 /// Runs batches as processes of this machine. A batch's item is a process group of its own; `mirevo_batch.log` in the
 /// slot's folder takes what the batch prints. When an item's first process ends, others of its group that still run are
 /// ended. One that has left its group on purpose (a daemon) may serve later runs. No process of a batch outlives this
 /// program, however it ends.
 class PosixProcessLauncher final : public ProcessLauncher {
  public:
-  PosixProcessLauncher() = default;
+  /// Seconds from any origin, never running backwards.
+  using MonotonicClock = std::function<double()>;
+
+  explicit PosixProcessLauncher(MonotonicClock clock = monotonicSeconds) : clock_(std::move(clock)) {}
   ~PosixProcessLauncher() override;
 
   bool initialise(const LauncherSettings& settings) override;
@@ -42,7 +51,9 @@ class PosixProcessLauncher final : public ProcessLauncher {
     std::size_t item = 0;                ///< that runs, or ran last
     int pidfd = -1;                      ///< -1 while nothing runs
     pid_t group = 0;
-    int log = -1;  ///< open for the whole run, so that a run that prints nothing makes no file
+    double started = 0.0;           ///< when the batch began
+    std::optional<double> overdue;  ///< when it was told to end because it ran too long
+    int log = -1;                   ///< open for the whole run, so that a run that prints nothing makes no file
     BatchFailure failure;
     std::string leftBehind;
   };
@@ -55,13 +66,17 @@ class PosixProcessLauncher final : public ProcessLauncher {
   bool renewLog(Slot& slot);
   void startItem(Slot& slot);
   void finishItem(Slot& slot, int code, int status);
+  void endOverdue(Slot& slot);
+  double secondsToLook(const Slot& slot) const;
   void endRestOfGroup(Slot& slot);
   void haltGroups();
   void closeDescriptors();
   std::atomic<pid_t>& groupEntry(const Slot& slot) const;
 
   std::string lastError_;
+  MonotonicClock clock_;
   double graceSeconds_ = 0.0;
+  double maxSeconds_ = 0.0;
   std::vector<Slot> slots_;
   ProcessMark mark_;
   std::vector<std::string> environmentTexts_;

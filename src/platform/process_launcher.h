@@ -20,6 +20,7 @@ struct LauncherSettings {
   int firstFolderNumber = 1;     ///< the number of slot 1's folder; the other slots' follow
   bool useSingleThread = false;  ///< set the usual thread-count variables to 1 for the model
   double graceSeconds = 2.0;     ///< between SIGTERM and SIGKILL when processes are halted
+  double maxSeconds = 0.0;       ///< longest time that a slot's batch may run, all of its items together; 0: any
 };
 
 /// How a slot's batch ended, or that it has not yet.
@@ -27,7 +28,7 @@ enum class BatchStatus : std::int32_t { succeeded = 0, failed = 1 };
 
 /// Why a batch failed.
 struct BatchFailure {
-  enum class Kind { none, exitCode, signal, couldNotStart };
+  enum class Kind { none, exitCode, signal, couldNotStart, timedOut };
   Kind kind = Kind::none;
   int code = 0;        ///< exit code or signal number
   std::string detail;  ///< one line for a person, naming the batch file: "run.sh exited with code 3"
@@ -63,7 +64,8 @@ class ProcessLauncher {
   /// Starts the slot's batch. A batch that cannot be started is reported by isExecuting() as failed.
   virtual void createProcesses(int slot) = 0;
 
-  /// `executing` becomes 1 while the slot's batch runs, else 0; `status` is then a BatchStatus.
+  /// `executing` becomes 1 while the slot's batch runs, else 0; `status` is then a BatchStatus. A batch that is seen
+  /// to have run longer than it may is ended here, and still runs until it is gone.
   virtual void isExecuting(int slot, std::int32_t& executing, std::int32_t& status) = 0;
 
   /// Why the slot's last batch failed.

@@ -26,7 +26,7 @@ struct Ending {
   bool mayBeModels = false;  ///< so plain a name that only the content tells
 };
 
-constexpr std::array<Ending, 13> kEndings = {{
+constexpr std::array<Ending, 17> kEndings = {{
     {"", ".log", false, true},
     {"", ".dat", false, true},
     {"", "._spi_"},
@@ -35,6 +35,10 @@ constexpr std::array<Ending, 13> kEndings = {{
     {"_Sensitivity", ".dat"},
     {"_Series", ".dat"},
     {"_Restart", ".dat"},
+    {"_Optimisation_Restart", ".dat"},
+    {"_Sensitivity_Restart", ".dat"},
+    {"_Simulated", ".bin"},
+    {"_Sensitivity_Simulated", ".bin"},
     {"_Report", ".html"},
     {"_Band_", ".csv", true},
     {"_Saved", ""},

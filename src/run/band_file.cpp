@@ -5,6 +5,7 @@
 #include <fmt/format.h>
 
 #include "common/calendar.h"
+#include "common/files.h"
 #include "run/record_file.h"
 #include "run/result_file.h"
 
@@ -28,6 +29,8 @@ void writeBandFile(const std::string& path, const std::string& title, const Obse
     text += fmt::format("{},{},{},{},{}\n", formatDate(time), cell(observed.values[t]), cell(band.lower[t]),
                         cell(band.median[t]), cell(band.upper[t]));
   }
+  std::string reason;
+  if (readTextFile(path, reason) == text) return;  // of a run that is walked through again
   keepEarlierFile(path);
   RecordFile file;
   file.open(path);

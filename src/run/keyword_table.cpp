@@ -48,6 +48,9 @@ constexpr auto into(FieldOf) {
   return [](RunConfig& config, std::size_t item, const SetupValue& value) { assign(FieldOf{}(config, item), value); };
 }
 
+/// As KeywordRow::bearsOnResults.
+constexpr bool kNotOfResults = false;
+
 /// A lambda that names a field of the configuration (`c`) or of the item (`i`) that is being read.
 #define MIREVO_FIELD(expression) \
   into([]([[maybe_unused]] RunConfig & c, [[maybe_unused]] std::size_t i) -> auto& { return expression; })
@@ -146,7 +149,16 @@ const std::vector<KeywordRow>& rows() {
        "number runs nothing and ends normally.",
        MIREVO_FIELD(c.simulationOption)},
       {kOption, "Title", Type::text, "''", kAny, "", "Title of the run, in the log and the result files.",
-       MIREVO_FIELD(c.title)},
+       MIREVO_FIELD(c.title), kNotOfResults},
+      {kOption, "Restart", Type::integer, "0", between(0, 2), "",
+       "1: an interrupted run goes on where it was cut off. 2: the same, and failed model runs at its end are made "
+       "again. "
+       "0: earlier results are kept under a numbered name and the run begins anew.",
+       MIREVO_FIELD(c.restart), kNotOfResults},
+      {kOption, "FailedRunFolders", Type::integer, "3", kNonNegative, "model runs",
+       "Of so many failed model runs, the first ones, the process folder is kept as `<setup>_Failed<evaluation "
+       "number>`.",
+       MIREVO_FIELD(c.failedRunFolders), kNotOfResults},
       countOf(kBatch),
       {kBatchItem, "BatchFileName", Type::fileName, "", kAny, "",
        "Runs the model. Its folder in the first item is the base folder, in or below which all files of the model lie. "
@@ -166,7 +178,7 @@ const std::vector<KeywordRow>& rows() {
        MIREVO_FIELD(c.parameterFiles[i].templateFileName)},
       countOf(kParameters),
       {kKeyLines, "KeyLine", Type::textLines, "''", kAny, "", "A line; the keyword may be repeated.",
-       MIREVO_FIELD(c.parameters[i].keyLines)},
+       MIREVO_FIELD(c.parameters[i].keyLines), kNotOfResults},
       {kParameter, "Initial_Value", Type::real, "", kAny, "of the parameter",
        "Value of a fixed parameter, starting point of a variable one, which must lie within its bounds.",
        MIREVO_FIELD(c.parameters[i].initialValue)},
@@ -188,7 +200,8 @@ const std::vector<KeywordRow>& rows() {
        "Unique name, used in templates, equations, messages and result files.", MIREVO_FIELD(c.parameters[i].name)},
       {kParameter, "Parameter_Equation", Type::freeText, "''", kAny, "",
        "Equation of a dependent parameter over the names of others.", MIREVO_FIELD(c.parameters[i].equation)},
-      {kParameter, "Comment", Type::freeText, "''", kAny, "", "Free text.", MIREVO_FIELD(c.parameters[i].comment)},
+      {kParameter, "Comment", Type::freeText, "''", kAny, "", "Free text.", MIREVO_FIELD(c.parameters[i].comment),
+       kNotOfResults},
       countOf(kConstraints),
       {kConstraint, "Left_Equation", Type::freeText, "", kAny, "", "Left side.",
        MIREVO_FIELD(c.constraints[i].leftEquation)},
@@ -250,7 +263,8 @@ const std::vector<KeywordRow>& rows() {
        MIREVO_FIELD(c.objectives[i].location)},
       countOf(kSaved),
       {kSavedFile, "File_name", Type::fileName, "", kAny, "",
-       "A file that the model writes, in or below the base folder.", MIREVO_FIELD(c.savedOutputFiles[i])},
+       "A file that the model writes, in or below the base folder.", MIREVO_FIELD(c.savedOutputFiles[i]),
+       kNotOfResults},
       {kScenarios, "Scenario_Type", Type::integer, "", between(0, 1), "",
        "0 a single run with the initial values, 1 multiple runs.", MIREVO_FIELD(c.scenario.scenarioType)},
       countOf(kScenarioRuns),
@@ -352,12 +366,15 @@ const std::vector<KeywordRow>& rows() {
       {kSlots, "NoSimultaneousSim", Type::integer, "1", from(1), "model runs",
        "Model runs at once, each in a process folder of its own; no more than the run has evaluations. In an "
        "optimisation more than 1 needs PSE. In an MPI job: 1 on each worker.",
-       MIREVO_FIELD(c.simultaneousSimulations)},
+       MIREVO_FIELD(c.simultaneousSimulations), kNotOfResults},
       {kSlots, "UseSingleThread", Type::integer, "0", kAny, "", "1: tells each model run to use one thread.",
-       MIREVO_FIELD(c.useSingleThread)},
+       MIREVO_FIELD(c.useSingleThread), kNotOfResults},
       {kSlots, "ProcessFolder", Type::fileName, "''", kAny, "",
        "Folder in which the process folders are made, such as a disk of the computing node; blank: beside the setup.",
-       MIREVO_FIELD(c.processFolder)},
+       MIREVO_FIELD(c.processFolder), kNotOfResults},
+      {kSlots, "MaxSimulationTime", Type::real, "0.0", kNonNegative, "s",
+       "Longest time of a model run; one that takes longer is ended and has failed. 0: no limit.",
+       MIREVO_FIELD(c.maxSimulationTime), kNotOfResults},
       {kMeasureFile, "File_Name", Type::fileName, "''", kAny, "",
        "In or below the base folder; required where a measure has interface type 1.", MIREVO_FIELD(c.measureFile)},
       {kReserved, "TmemOption", Type::integer, "0", kAny, "", "Not used."},

@@ -62,6 +62,8 @@ struct KeywordRow {
   /// Puts the value into its field; `item` is the 0-based number of the item section that was read. Null for list
   /// counts and for what is known and not used.
   void (*store)(RunConfig& config, std::size_t item, const SetupValue& value) = nullptr;
+  /// Whether another value may give other results: a run is then not taken up again with it.
+  bool bearsOnResults = true;
 
   bool isRequired() const { return defaultValue.empty(); }
   bool isLeftOutByDefault() const { return defaultValue == kNoDefault; }

@@ -144,8 +144,14 @@ void ProgressReporter::progressStep() {
   isCancelled();
 }
 
+void ProgressReporter::progressReplayed() {
+  ++completedEvaluations_;
+  times_.assign(1, clock_());
+}
+
 void ProgressReporter::progressBest(int number, double aggregate, std::string_view foundAt) {
-  writeMessage(fmt::format("Best so far: {} (evaluation {}, {})", formatReal(aggregate), number, foundAt));
+  writeMessage(fmt::format("Best so far: {} (evaluation {}{}{})", formatReal(aggregate), number,
+                           foundAt.empty() ? "" : ", ", foundAt));
 }
 
 void ProgressReporter::progressEnd(std::string_view ending) {

@@ -38,7 +38,10 @@ class ProgressReporter final {
   void progressEvaluationLabel(int plannedEvaluations);
   /// After each completed evaluation: speed, time left and percentage; then looks for the kill file.
   void progressStep();
-  /// A new best evaluation: its number, aggregate, and when it was found, as dateAndTimeWithZone() says it.
+  /// After an evaluation whose result was taken from an earlier run: it is counted, but says nothing of the speed.
+  void progressReplayed();
+  /// A new best evaluation: its number, aggregate, and when it was found, as dateAndTimeWithZone() says it; empty for
+  /// one of an earlier run.
   void progressBest(int number, double aggregate, std::string_view foundAt);
   /// The last records; `ending` says how the run ended ("Normal termination").
   void progressEnd(std::string_view ending);

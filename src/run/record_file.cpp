@@ -9,20 +9,41 @@
 
 #include <fmt/format.h>
 
+#include "common/descriptor.h"
 #include "common/fatal_error.h"
+#include "common/files.h"
 
 namespace mirevo {
+namespace {
+
+bool flushToDisk(const std::string& path) {
+  const Descriptor file(::open(path.c_str(), O_WRONLY | O_CLOEXEC));
+  return file.get() >= 0 && ::fsync(file.get()) == 0;
+}
+
+}  // namespace
 
 RecordFile::~RecordFile() {
   close();
 }
 
 void RecordFile::open(const std::string& path) {
+  openWith(path, O_CREAT | O_TRUNC);
+}
+
+void RecordFile::openToContinue(const std::string& path) {
+  openWith(path, O_APPEND);
+  struct stat status {};
+  if (::fstat(descriptor_, &status) != 0) fatalError("Error: Unable to open " + path, std::strerror(errno));
+  size_ = status.st_size;
+}
+
+void RecordFile::openWith(const std::string& path, int flags) {
   close();
   path_ = path;
   size_ = 0;
   failed_ = false;
-  descriptor_ = ::open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0666);
+  descriptor_ = ::open(path.c_str(), O_WRONLY | O_CLOEXEC | flags, 0666);
   if (descriptor_ < 0) fatalError("Error: Unable to open " + path, std::strerror(errno));
 }
 
@@ -56,6 +77,19 @@ bool RecordFile::tryAppend(std::string_view record, std::string& reason) {
 void RecordFile::close() {
   if (descriptor_ >= 0) ::close(descriptor_);
   descriptor_ = -1;
+}
+
+bool replaceFile(const std::string& path, std::string_view content, std::string& reason) {
+  const std::string temporary = path + ".tmp";
+  struct stat status {};
+  const unsigned mode = ::stat(path.c_str(), &status) == 0 ? status.st_mode : 0644;
+  bool replaced = writeByUnlinkAndCreate(temporary, content, mode, reason);
+  if (replaced) {
+    replaced = flushToDisk(temporary) && ::rename(temporary.c_str(), path.c_str()) == 0;
+    if (!replaced) reason = std::strerror(errno);
+  }
+  if (!replaced) ::unlink(temporary.c_str());
+  return replaced;
 }
 
 std::string keepEarlierFile(const std::string& path) {

@@ -18,6 +18,9 @@ class RecordFile final {
   /// Creates the file anew. Throws FatalError with the system's reason.
   void open(const std::string& path);
 
+  /// Goes on behind what the file holds. Throws FatalError with the system's reason.
+  void openToContinue(const std::string& path);
+
   /// Appends `record` as it stands, line ends included. Throws FatalError with the system's reason, once: a file that
   /// could not be written takes no further records.
   void append(std::string_view record);
@@ -33,11 +36,18 @@ class RecordFile final {
   std::int64_t size() const { return size_; }
 
  private:
+  void openWith(const std::string& path, int flags);
+
   std::string path_;
   int descriptor_ = -1;
   std::int64_t size_ = 0;
   bool failed_ = false;
 };
+
+/// Puts `content` in the place of a file, or makes it: written beside it, flushed to disk and renamed, so that at every
+/// moment either the old or the new one is there, whole. The old file's mode is kept. False, with the system's reason,
+/// when that fails; the old file is then untouched.
+bool replaceFile(const std::string& path, std::string_view content, std::string& reason);
 
 /// Keeps an earlier run's file or folder from being overwritten: renames `path` to the first free of
 /// `<stem>.1<ending>`, `<stem>.2<ending>` ... and returns that name; empty when there is nothing to keep, or something

@@ -1,15 +1,12 @@
 #include "run/result_file.h"
 
 #include <algorithm>
-#include <cerrno>
-#include <cstdio>
-#include <cstring>
-#include <fcntl.h>
-#include <sys/stat.h>
-#include <unistd.h>
+#include <iterator>
+#include <utility>
 
 #include <fmt/format.h>
 
+#include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/text.h"
 
@@ -29,21 +26,15 @@ std::string commentLines(std::span<const std::string> texts) {
   return lines;
 }
 
+std::string rowStart(int number, bool ok) {
+  return fmt::format("{}\t{}", number, ok ? "OK" : "FAILED");
+}
+
 void addColumns(std::string& row, std::span<const double> values) {
   for (const double value : values) {
     row += '\t';
     row += formatReal(value);
   }
-}
-
-bool flushToDisk(const std::string& path) {
-  const int descriptor = ::open(path.c_str(), O_WRONLY | O_CLOEXEC);
-  if (descriptor < 0) return false;
-  const bool flushed = ::fsync(descriptor) == 0;
-  const int reason = errno;
-  ::close(descriptor);
-  errno = reason;
-  return flushed;
 }
 
 }  // namespace
@@ -58,22 +49,37 @@ std::string columnName(std::string_view name) {
   return harmless;
 }
 
-void ResultFile::open(const std::string& path, std::span<const std::string> headLines, const ResultColumns& columns) {
+void ResultFile::open(const std::string& path, std::span<const std::string> headLines, const ResultColumns& columns,
+                      std::span<const ResultTable::Row> earlierRows) {
   rows_.clear();
   aggregates_.clear();
-  file_.open(path);
   std::string head = commentLines(headLines);
   head += "Evaluation\tStatus";
   for (const auto* names : {&columns.parameters, &columns.measures, &columns.objectives}) {
     for (const std::string& name : *names) head += '\t' + columnName(name);
   }
   head += "\tAggregate\n";
-  file_.append(head);
-  headLength_ = file_.size();
+  headLength_ = std::ssize(head);
+  if (earlierRows.empty()) {
+    file_.open(path);
+    file_.append(head);
+    return;
+  }
+  std::string content = std::move(head);
+  for (const ResultTable::Row& row : earlierRows) {
+    std::string line = rowStart(row.number, row.ok);
+    addColumns(line, row.values);
+    line += '\n';
+    rows_.push_back({row.number, std::ssize(content), std::ssize(line)});
+    content += line;
+  }
+  std::string reason;
+  if (!replaceFile(path, content, reason)) fatalError("Error: Unable to write to " + path, reason);
+  file_.openToContinue(path);
 }
 
 void ResultFile::addRow(std::span<const double> parameterValues, const EvaluationResult& result) {
-  std::string row = fmt::format("{}\t{}", result.number, result.ok() ? "OK" : "FAILED");
+  std::string row = rowStart(result.number, result.ok());
   addColumns(row, parameterValues);
   addColumns(row, result.measureValues);
   addColumns(row, result.objectiveValues);
@@ -126,17 +132,7 @@ bool ResultFile::rewriteInOrder(std::string_view closing, std::string& reason) c
   sorted.append(*content, 0, static_cast<std::size_t>(headLength_));
   for (const Row& row : ordered) appendRow(sorted, *content, row);
   sorted += closing;
-  // Written beside it and renamed, so that there is no moment at which a row is nowhere.
-  const std::string temporary = path() + ".tmp";
-  struct stat status {};
-  const unsigned mode = ::stat(path().c_str(), &status) == 0 ? status.st_mode : 0644;
-  bool replaced = writeByUnlinkAndCreate(temporary, sorted, mode, reason);
-  if (replaced) {
-    replaced = flushToDisk(temporary) && ::rename(temporary.c_str(), path().c_str()) == 0;
-    if (!replaced) reason = std::strerror(errno);
-  }
-  if (!replaced) ::unlink(temporary.c_str());
-  return replaced;
+  return replaceFile(path(), sorted, reason);
 }
 
 }  // namespace mirevo

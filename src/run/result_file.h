@@ -7,6 +7,7 @@
 #include <string_view>
 #include <vector>
 
+#include "common/result_table.h"
 #include "evaluation/evaluation_result.h"
 #include "run/record_file.h"
 
@@ -24,8 +25,10 @@ struct ResultColumns {
 /// holds them in the order of their numbers.
 class ResultFile final {
  public:
-  /// Creates the file with its head lines (without "# ") and its header row. Throws FatalError.
-  void open(const std::string& path, std::span<const std::string> headLines, const ResultColumns& columns);
+  /// Creates the file with its head lines (without "# "), its header row and the rows of an earlier run, which is then
+  /// in the place of the earlier file: there is no moment at which a row is nowhere. Throws FatalError.
+  void open(const std::string& path, std::span<const std::string> headLines, const ResultColumns& columns,
+            std::span<const ResultTable::Row> earlierRows = {});
 
   /// One evaluation: `parameterValues` on the model scale, one a column. Throws FatalError when it cannot be written.
   void addRow(std::span<const double> parameterValues, const EvaluationResult& result);

@@ -34,6 +34,12 @@ struct SensitivityConfig {
   bool calculateCovarianceMatrix = false;
 };
 
+/// A search with a smaller budget from whose best set a DDS with a raised one goes on.
+struct EarlierSearch {
+  std::int32_t maxEvaluations = 0;  ///< its budget, counted from the first evaluation of the run
+  std::int32_t lastEvaluation = 0;  ///< the number of its last evaluation
+};
+
 struct OptimisationConfig {
   AlgorithmType algorithmType = AlgorithmType::dds;
   std::int32_t useSurrogateModel = 0;
@@ -44,6 +50,15 @@ struct OptimisationConfig {
   SurrogateSettings surrogate;
   StoppingCriteria stopping;
   InitialSampleSettings initialSample;
+  std::vector<EarlierSearch> earlierSearches;  ///< of DDS; not from the setup but from the run that is taken up
+};
+
+/// A setting that bears on the results, as the setup has it.
+struct ResultSetting {
+  std::string section;  ///< names below the target, `/` between them
+  std::string keyword;
+  std::string value;  ///< as in the log; a file's name relative to the setup's folder
+  bool isDefault = false;
 };
 
 /// All settings of a run. File names are absolute. Composed of the settings that each part defines for itself; no part
@@ -76,7 +91,12 @@ struct RunConfig {
   std::int32_t simultaneousSimulations = 1;
   bool usesMpiWorkers = false;  ///< then `simultaneousSimulations` is 1, on each worker
   bool useSingleThread = false;
-  std::string processFolder;  ///< where the process folders are made; empty: beside the setup
+  std::string processFolder;       ///< where the process folders are made; empty: beside the setup
+  double maxSimulationTime = 0.0;  ///< seconds that a model run may take; 0: any
+
+  std::int32_t restart = 0;           ///< 0 begins anew, 1 goes on, 2 goes on and repeats failed runs at the end
+  std::int32_t failedRunFolders = 3;  ///< failed model runs whose process folder is kept
+  std::vector<ResultSetting> resultSettings;  ///< in reading order; what may not change when a run is taken up again
 
   /// Model evaluations that the task plans; sizes the failed-run limit and the progress report. 0 where the simulation
   /// option names no task.

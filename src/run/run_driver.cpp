@@ -104,6 +104,9 @@ void RunDriver::openRun(const std::string& setupFileName) {
 void RunDriver::buildModel() {
   parameters_ = std::make_unique<ParameterModel>(config_.parameters, config_.constraints);
   aggregator_ = std::make_unique<ObjectiveAggregator>(config_.objectives, config_.aggregationMethod);
+  // Before the process folders are made anew: a run that cannot be taken up again leaves everything as it is.
+  results_.emplace(config_, parameters_->searchSpace(), filePrefix_);
+  config_.optimisation.earlierSearches = results_->earlierSearches();
   launcher_ = std::make_unique<PosixProcessLauncher>();
   signalState.haltProcesses = haltProcessesFromSignal;
   const int slotCount = state_.mpiInUse ? 0 : config_.simultaneousSimulations;  // the master runs no model
@@ -131,41 +134,17 @@ void RunDriver::logSetup() {
 
 void RunDriver::openResults() {
   state_.objectiveValues.resize(config_.objectives.size());
-  const SearchSpace& space = parameters_->searchSpace();
-  const std::string failedRunPath = std::filesystem::path(filePrefix_).replace_filename("calSimErr.dat").string();
-  keepEarlierFile(failedRunPath);
-  failedRunFile_ = std::make_unique<FailedRunFile>(failedRunPath, config_.setupName, space.names);
-
-  openResultFile();
-  if (const std::string kept = keepEarlierFile(filePrefix_ + "_Saved"); !kept.empty()) {
-    state_.log.line("The saved output files of the earlier run were kept as " + kept);
-  }
-  reporter_ = std::make_unique<RunReporter>(state_, results_, *failedRunFile_, space);
-  failedRunPolicy_.emplace(config_.plannedEvaluations());
+  results_->open(config_, runner_->observedSeries(), *aggregator_, state_.log);
+  reporter_ = std::make_unique<RunReporter>(state_, results_->table(), results_->failedRuns(),
+                                            parameters_->searchSpace(), results_->simulatedValues());
+  failedRunPolicy_.emplace(config_.plannedEvaluations(), config_.failedRunFolders);
+  EarlierEvaluations* const earlier = results_->earlierEvaluations();
   if (state_.mpiInUse) {
-    evaluator_ = std::make_unique<MpiEvaluator>(*runner_, state_.mpi, *reporter_, *failedRunPolicy_);
+    evaluator_ = std::make_unique<MpiEvaluator>(*runner_, state_.mpi, *reporter_, *failedRunPolicy_, earlier);
   } else {
-    evaluator_ =
-        std::make_unique<LocalEvaluator>(*runner_, *reporter_, *failedRunPolicy_, config_.simultaneousSimulations);
+    evaluator_ = std::make_unique<LocalEvaluator>(*runner_, *reporter_, *failedRunPolicy_,
+                                                  config_.simultaneousSimulations, earlier);
   }
-}
-
-void RunDriver::openResultFile() {
-  const std::string_view ending = resultFileEnding(config_);
-  if (ending.empty()) return;
-  const std::string path = filePrefix_ + std::string(ending);
-  if (const std::string kept = keepEarlierFile(path); !kept.empty()) {
-    state_.log.line("The results of the earlier run were kept as " + kept);
-  }
-  ResultColumns columns;
-  columns.parameters = parameters_->searchSpace().names;
-  for (const OutputMeasure& measure : config_.measures) columns.measures.push_back(measure.name);
-  for (const ObjectiveFunction& objective : config_.objectives) columns.objectives.push_back(objective.name);
-  std::vector<std::string> head{config_.title, fmt::format("Mirevo {}", programVersion()), taskName(config_)};
-  if (config_.drawsRandomNumbers()) head.push_back(fmt::format("Random seed: {}", config_.randomSeed));
-  head.push_back("Setup file: " + config_.setupFile);
-  head.push_back("Started: " + dateAndTimeNow());
-  results_.open(path, head, columns);
 }
 
 std::vector<std::string> RunDriver::closingLines(std::string_view terminationMessage) const {
@@ -188,17 +167,21 @@ bool RunDriver::closeResults(std::string_view terminationMessage, std::string& r
   if (reporter_) reporter_->settle(*aggregator_);
   std::vector<std::string> lines = closingLines(terminationMessage);
   lines.insert(lines.end(), report.begin(), report.end());
-  return results_.finish(lines, reason);
+  return !results_ || results_->table().finish(lines, reason);
 }
 
 void RunDriver::finish(const TaskOutcome& outcome) {
   std::string reason;
   if (!closeResults(outcome.terminationMessage, reason, outcome.report)) {
-    fatalError("Error: Unable to write to " + results_.path(), reason);
+    fatalError("Error: Unable to write to " + results_->table().path(), reason);
   }
   state_.log.line("");
   state_.log.line(
       fmt::format("{} model evaluations, {} of them failed", reporter_->evaluationCount(), reporter_->failedCount()));
+  if (reporter_->replayedCount() > 0) {
+    state_.log.line(fmt::format("{} of them were taken from the earlier run", reporter_->replayedCount()));
+  }
+  logFailures();
   state_.log.line("");
   state_.log.line(kNormalTermination);
   if (!state_.log.writeError().empty()) {
@@ -210,12 +193,21 @@ void RunDriver::finish(const TaskOutcome& outcome) {
   state_.progress.progressEnd(kNormalTermination);
 }
 
+/// Which reasons the run's failures had, and how often.
+void RunDriver::logFailures() {
+  if (reporter_->failedCount() == 0) return;
+  state_.log.line("Why evaluations failed:");
+  for (const std::string& line : reporter_->failures().lines()) state_.log.line(line);
+}
+
 int RunDriver::endInError(std::string_view message, std::string_view detail) {
   std::string text(trimTrailing(message));
   if (!text.empty()) {
     if (!detail.empty()) text.append("\n").append(detail);
-    if (reporter_ && reporter_->failedCount() > 0) text += "\nfailed model runs are described in calSimErr.dat";
+    if (reporter_ && reporter_->failedCount() > 0)
+      text += fmt::format("\nfailed model runs are described in {}", kFailedRunFileName);
     state_.log.line("");
+    if (reporter_) logFailures();
     state_.log.line(text);
     showMessage(text);
   }
@@ -228,7 +220,7 @@ int RunDriver::endCancelled(std::string_view message) {
   showMessage(message);
   std::string reason;
   if (!closeResults(message, reason)) {
-    state_.log.line(fmt::format("Error: Unable to write to {}\n{}", results_.path(), reason));
+    state_.log.line(fmt::format("Error: Unable to write to {}\n{}", results_->table().path(), reason));
   }
   return endEarly(message);
 }

@@ -12,11 +12,10 @@
 #include "measures/objective_functions.h"
 #include "parameters/parameter_model.h"
 #include "platform/process_launcher.h"
-#include "run/failed_run_file.h"
-#include "run/result_file.h"
 #include "run/run_config.h"
 #include "run/run_lock.h"
 #include "run/run_reporter.h"
+#include "run/run_results.h"
 #include "run/run_state.h"
 #include "run/tasks.h"
 
@@ -39,11 +38,11 @@ class RunDriver final {
   void buildModel();
   void logSetup();
   void openResults();
-  void openResultFile();
   /// False, with the system's reason, when the results could not be brought to their end. `report`: what the task
   /// found.
   bool closeResults(std::string_view terminationMessage, std::string& reason, std::span<const std::string> report = {});
   void finish(const TaskOutcome& outcome);
+  void logFailures();
   int endInError(std::string_view message, std::string_view detail);
   int endCancelled(std::string_view message);
   /// Log closed, model processes halted, MPI job left, progress ended.
@@ -56,10 +55,9 @@ class RunDriver final {
   RunLock lock_;
   std::string filePrefix_;  ///< folder and name of the setup, without ".kdx": the run's files begin with it
   RunConfig config_;
-  ResultFile results_;
   std::unique_ptr<ParameterModel> parameters_;
   std::unique_ptr<ObjectiveAggregator> aggregator_;
-  std::unique_ptr<FailedRunFile> failedRunFile_;
+  std::optional<RunResults> results_;
   std::unique_ptr<RunReporter> reporter_;
   std::optional<FailedRunPolicy> failedRunPolicy_;
   std::unique_ptr<ProcessLauncher> launcher_;

@@ -6,8 +6,9 @@
 
 namespace mirevo {
 
-RunReporter::RunReporter(RunState& state, ResultFile& results, FailedRunFile& failedRuns, const SearchSpace& space)
-    : state_(state), results_(results), failedRuns_(failedRuns), space_(space) {}
+RunReporter::RunReporter(RunState& state, ResultFile& results, FailedRunFile& failedRuns, const SearchSpace& space,
+                         SimulatedValuesFile* simulatedValues)
+    : state_(state), results_(results), failedRuns_(failedRuns), space_(space), simulatedValues_(simulatedValues) {}
 
 void RunReporter::message(std::string_view text) {
   state_.log.line(text);
@@ -20,22 +21,39 @@ void RunReporter::warning(std::string_view text) {
 
 void RunReporter::evaluationFinished(std::span<const double> set, const EvaluationResult& result) {
   const std::vector<double> values = ToModelScale(space_, set);
+  // The row comes last: where it stands, all that belongs to it does, too, whenever the program is ended.
+  if (!result.ok()) failedRuns_.add(values, result);
+  if (result.ok() && simulatedValues_ != nullptr) simulatedValues_->add(result);
   results_.addRow(values, result);
+  if (!result.ok()) state_.log.line("   " + result.failure->reason);  // below the message that it failed
+  count(values, result, dateAndTimeWithZone());
+  state_.progress.progressStep();
+  requireLogWritten();
+}
+
+void RunReporter::evaluationReplayed(std::span<const double> set, const EvaluationResult& result) {
+  ++replayedCount_;
+  count(ToModelScale(space_, set), result, {});
+  state_.progress.progressReplayed();
+}
+
+void RunReporter::count(const std::vector<double>& parameterValues, const EvaluationResult& result,
+                        std::string_view foundAt) {
   ++evaluationCount_;
   state_.objectiveValues = result.objectiveValues;
   if (!result.ok()) {
     ++failedCount_;
-    failedRuns_.add(values, result);
-    state_.log.line("   " + result.failure->reason);  // below the message that it failed
+    failures_.add(result.number, *result.failure);
   } else if (std::isnan(result.aggregate)) {
-    unsettled_.push_back({result.number, values, result.objectiveValues});
+    unsettled_.push_back({result.number, parameterValues, result.objectiveValues});
   } else if (!result.objectiveValues.empty()) {
-    considerAsBest(result.number, result.aggregate, values);
+    considerAsBest(result.number, result.aggregate, parameterValues, foundAt);
   }
-  state_.progress.progressStep();
-  if (!state_.log.writeError().empty()) {
-    fatalError("Error: Unable to write to " + state_.log.path(), state_.log.writeError());
-  }
+}
+
+void RunReporter::requireLogWritten() const {
+  if (state_.log.writeError().empty()) return;
+  fatalError("Error: Unable to write to " + state_.log.path(), state_.log.writeError());
 }
 
 void RunReporter::takeBestOf(const SearchSummary& search) {
@@ -44,13 +62,14 @@ void RunReporter::takeBestOf(const SearchSummary& search) {
   isBestOfSearch_ = true;
 }
 
-void RunReporter::considerAsBest(int number, double aggregate, const std::vector<double>& parameterValues) {
+void RunReporter::considerAsBest(int number, double aggregate, const std::vector<double>& parameterValues,
+                                 std::string_view foundAt) {
   if (isBestOfSearch_) return;
   const bool isBetter =
       !best_ || aggregate < best_->aggregate || (aggregate == best_->aggregate && number < best_->number);
   if (!isBetter) return;
   best_ = Best{number, aggregate, parameterValues};
-  state_.progress.progressBest(number, aggregate, dateAndTimeWithZone());
+  state_.progress.progressBest(number, aggregate, foundAt);
 }
 
 void RunReporter::settle(const ObjectiveAggregator& aggregator) {
@@ -58,7 +77,7 @@ void RunReporter::settle(const ObjectiveAggregator& aggregator) {
   for (const Unsettled& evaluation : unsettled_) {
     const double aggregate = aggregator.aggregate(evaluation.objectiveValues);
     results_.replaceAggregate(evaluation.number, aggregate);
-    considerAsBest(evaluation.number, aggregate, evaluation.parameterValues);
+    considerAsBest(evaluation.number, aggregate, evaluation.parameterValues, dateAndTimeWithZone());
   }
   unsettled_.clear();
 }

@@ -9,8 +9,10 @@
 #include "measures/objective_functions.h"
 #include "parameters/search_space.h"
 #include "run/failed_run_file.h"
+#include "run/failure_summary.h"
 #include "run/result_file.h"
 #include "run/run_state.h"
+#include "run/simulated_values_file.h"
 
 namespace mirevo {
 
@@ -18,11 +20,14 @@ namespace mirevo {
 class RunReporter final : public EvaluationObserver {
  public:
   /// The result file is open; all must outlive the reporter.
-  RunReporter(RunState& state, ResultFile& results, FailedRunFile& failedRuns, const SearchSpace& space);
+  /// `simulatedValues`: takes those of every evaluation; may be null.
+  RunReporter(RunState& state, ResultFile& results, FailedRunFile& failedRuns, const SearchSpace& space,
+              SimulatedValuesFile* simulatedValues = nullptr);
 
   void message(std::string_view text) override;
   void warning(std::string_view text) override;
   void evaluationFinished(std::span<const double> set, const EvaluationResult& result) override;
+  void evaluationReplayed(std::span<const double> set, const EvaluationResult& result) override;
   bool isCancelled() override { return state_.progress.isCancelled(); }
 
   /// At the end of a run: fills in the aggregates of evaluations that came before the objective transformation was
@@ -44,6 +49,9 @@ class RunReporter final : public EvaluationObserver {
 
   int evaluationCount() const { return evaluationCount_; }
   int failedCount() const { return failedCount_; }
+  /// Evaluations whose results were taken from an earlier run.
+  int replayedCount() const { return replayedCount_; }
+  const FailureSummary& failures() const { return failures_; }
 
  private:
   /// An evaluation whose aggregate was not known when it arrived.
@@ -52,17 +60,23 @@ class RunReporter final : public EvaluationObserver {
     std::vector<double> parameterValues;
     std::vector<double> objectiveValues;
   };
-  void considerAsBest(int number, double aggregate, const std::vector<double>& parameterValues);
+  void count(const std::vector<double>& parameterValues, const EvaluationResult& result, std::string_view foundAt);
+  void considerAsBest(int number, double aggregate, const std::vector<double>& parameterValues,
+                      std::string_view foundAt);
+  void requireLogWritten() const;
 
   RunState& state_;
   ResultFile& results_;
   FailedRunFile& failedRuns_;
   const SearchSpace& space_;
+  SimulatedValuesFile* simulatedValues_;
   std::optional<Best> best_;
   bool isBestOfSearch_ = false;
   std::vector<Unsettled> unsettled_;
   int evaluationCount_ = 0;
   int failedCount_ = 0;
+  int replayedCount_ = 0;
+  FailureSummary failures_;
 };
 
 }  // namespace mirevo

@@ -19,13 +19,31 @@ std::string_view searchShortName(AlgorithmType type) {
   return {};
 }
 
+namespace {
+
+/// DDS, behind the searches with smaller budgets that it goes on from: each starts from the best set of the one before.
+SearchSummary runDds(const OptimisationConfig& config, SearchBounds bounds, Evaluator& evaluator,
+                     UniformGenerator& random) {
+  bool startsFromInitial = config.initialSample.includeInitialParameters;
+  int made = 0;
+  for (const EarlierSearch& earlier : config.earlierSearches) {
+    Dds search(config.dds, earlier.maxEvaluations - made, startsFromInitial, bounds, evaluator, random);
+    bounds.initial = runSearch(search, searchShortName(AlgorithmType::dds), {}, earlier.lastEvaluation - made).best;
+    startsFromInitial = true;
+    made = earlier.lastEvaluation;
+  }
+  Dds search(config.dds, config.stopping.maxEvaluations - made, startsFromInitial, std::move(bounds), evaluator,
+             random);
+  return runSearch(search, searchShortName(AlgorithmType::dds), {});
+}
+
+}  // namespace
+
 SearchSummary runConfiguredSearch(const OptimisationConfig& config, const SearchSpace& space, Evaluator& evaluator,
                                   UniformGenerator& random, const PeriodicStep& periodicStep) {
   SearchBounds bounds = searchBounds(space);
   if (config.algorithmType == AlgorithmType::dds) {
-    Dds search(config.dds, config.stopping.maxEvaluations, config.initialSample.includeInitialParameters,
-               std::move(bounds), evaluator, random);
-    return runSearch(search, searchShortName(config.algorithmType), {});
+    return runDds(config, std::move(bounds), evaluator, random);
   }
   SearchProblem problem{std::move(bounds), config.stopping, config.initialSample, {}, evaluator, random};
   if (config.initialSample.generation == static_cast<std::int32_t>(SampleGeneration::fromFile)) {

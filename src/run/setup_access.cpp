@@ -58,6 +58,10 @@ std::string SetupFile::resolve(std::string_view fileName) const {
   return normal;
 }
 
+std::string SetupFile::relative(const std::string& path) const {
+  return path.starts_with(folder_ + "/") ? path.substr(folder_.size() + 1) : path;
+}
+
 SetupSection::SetupSection(SetupFile& file, const KdxSection& node, std::string path, std::string pattern)
     : file_(&file), node_(&node), path_(std::move(path)), pattern_(std::move(pattern)) {}
 
@@ -103,15 +107,22 @@ void SetupSection::readRow(const KeywordRow& row, RunConfig& config, std::size_t
   const bool isList = row.type == KeywordType::textLines;
   const int count = isList ? node_->keywordCount(row.name) : std::min(1, node_->keywordCount(row.name));
   for (int instance = 1; instance <= count; ++instance) {
-    const SetupValue value = convert(row, *node_->keyword(row.name, instance));
-    echo(row.name, value, false);
-    row.store(config, item, value);
+    take(row, convert(row, *node_->keyword(row.name, instance)), false, config, item);
   }
   if (count > 0 || isList || row.isLeftOutByDefault()) return;
   if (row.isRequired()) refuseMissing(row);
-  const SetupValue value = defaultSetupValue(row);
-  echo(row.name, value, true);
+  take(row, defaultSetupValue(row), true, config, item);
+}
+
+void SetupSection::take(const KeywordRow& row, const SetupValue& value, bool isDefault, RunConfig& config,
+                        std::size_t item) const {
+  echo(row.name, value, isDefault);
   row.store(config, item, value);
+  if (!row.bearsOnResults) return;
+  const bool isFile = row.type == KeywordType::fileName;
+  config.resultSettings.push_back({path_, std::string(row.name),
+                                   isFile ? file_->relative(std::get<std::string>(value)) : formatSetupValue(value),
+                                   isDefault});
 }
 
 std::size_t SetupSection::readCount(std::string_view itemPrefix) const {

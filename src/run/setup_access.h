@@ -29,6 +29,9 @@ class SetupFile final {
   std::string place(KdxPosition position) const;
   /// Absolute and normal form of a file name of the setup; blank stays blank.
   std::string resolve(std::string_view fileName) const;
+  /// The inverse of resolve() for a file in or below the setup's folder, so that the folder can be moved; others as
+  /// they are.
+  std::string relative(const std::string& path) const;
 
  private:
   KdxDocument document_;
@@ -79,6 +82,7 @@ class SetupSection final {
   [[noreturn]] void refuseMissing(const KeywordRow& row) const;
   [[noreturn]] void refuseToRead(KdxPosition position, std::string_view keyword, std::string_view explanation) const;
   void echo(std::string_view keyword, const SetupValue& value, bool isDefault) const;
+  void take(const KeywordRow& row, const SetupValue& value, bool isDefault, RunConfig& config, std::size_t item) const;
 
   SetupFile* file_;
   const KdxSection* node_;

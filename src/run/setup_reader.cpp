@@ -107,6 +107,8 @@ void SetupReader::readSimulationOption() {
   const SetupSection section = target_.open("MIREVO_SIMULATION_OPTION");
   section.read(config_);
   const auto option = static_cast<std::int32_t>(config_.simulationOption);
+  section.check("Restart", config_.restart, "Error: Invalid restart option");
+  section.check("FailedRunFolders", config_.failedRunFolders, "Error: Invalid No. of folders of failed model runs");
   if (option < 0 || option > 3) section.warn("Option", "no task has this number, nothing will be run");
   readItems(section.open("SIMBATCH"), "SIMBATCHITEM_", config_.batchItems,
             "Error: No model simulation sequence defined",
@@ -399,6 +401,7 @@ void SetupReader::readSimultaneousSimulations() {
   const SetupSection section = target_.open("SimultaneousSimulations");
   section.read(config_);
   validateProcessCount(config_, section);
+  section.check("MaxSimulationTime", config_.maxSimulationTime, "Error: Invalid maximum simulation time");
   if (config_.usesMpiWorkers) {
     if (config_.simultaneousSimulations > 1)
       section.note("NoSimultaneousSim", "taken as 1 on each worker of the MPI job");

@@ -61,7 +61,7 @@ std::string runOptimisation(const TaskContext& context) {
   logBestSet(context, best.front(), summary.bestResult);
   context.log.line("");
   context.log.line("Final model run with the best parameter set:");
-  context.evaluator.evaluateParameterSets(best, DispatchMode::task);
+  context.evaluator.evaluateParameterSets(best, DispatchMode::finalRun);
   return summary.terminationMessage;
 }
 

@@ -1,5 +1,7 @@
 #pragma once
 
+#include <cmath>
+#include <map>
 #include <memory>
 #include <string>
 #include <vector>
@@ -24,6 +26,9 @@ class RecordingObserver final : public EvaluationObserver {
   void warning(std::string_view text) override { events.push_back("warning: " + std::string(text)); }
   void evaluationFinished(std::span<const double> set, const EvaluationResult& result) override {
     events.push_back(fmt::format("record {} a={} {}", result.number, set[0], result.ok() ? "OK" : "FAILED"));
+  }
+  void evaluationReplayed(std::span<const double> set, const EvaluationResult& result) override {
+    events.push_back(fmt::format("replay {} a={} {}", result.number, set[0], result.ok() ? "OK" : "FAILED"));
   }
   bool isCancelled() override { return cancelled; }
 
@@ -79,15 +84,28 @@ class EvaluationTest : public testing::Test {
     return text;
   }
 
+  /// Evaluations of an earlier run: the set's value by number, those with a negative one failed.
+  void takeUp(const std::map<int, double>& values) {
+    aggregator_ = std::make_unique<ObjectiveAggregator>(description_.objectives, method_);
+    std::map<int, EarlierEvaluations::Record> records;
+    for (const auto& [number, value] : values) {
+      EarlierEvaluations::Record& record = records[number];
+      record.parameterValues = {std::abs(value)};
+      record.result.measureValues = {std::abs(value) - 1.0};
+      record.result.objectiveValues = {std::abs(std::abs(value) - 1.0)};
+      if (value < 0) record.result.failure = EvaluationFailure{EvaluationFailure::Kind::signal, "in the past", {}};
+    }
+    earlier_ = std::make_unique<EarlierEvaluations>(parameters_->searchSpace(), *aggregator_, std::move(records));
+  }
   void makeRunner(ProcessLauncher& launcher, int slotCount) {
     settings_.slotCount = slotCount;
-    aggregator_ = std::make_unique<ObjectiveAggregator>(description_.objectives, method_);
+    if (!aggregator_) aggregator_ = std::make_unique<ObjectiveAggregator>(description_.objectives, method_);
     runner_ = std::make_unique<ModelRunner>(description_, *parameters_, *aggregator_, launcher, settings_);
   }
   LocalEvaluator& makeEvaluator(ProcessLauncher& launcher, int slotCount, int planned) {
     makeRunner(launcher, slotCount);
-    failedRuns_ = std::make_unique<FailedRunPolicy>(planned);
-    evaluator_ = std::make_unique<LocalEvaluator>(*runner_, observer_, *failedRuns_, slotCount);
+    failedRuns_ = std::make_unique<FailedRunPolicy>(planned, foldersToKeep_);
+    evaluator_ = std::make_unique<LocalEvaluator>(*runner_, observer_, *failedRuns_, slotCount, earlier_.get());
     return *evaluator_;
   }
 
@@ -99,7 +117,9 @@ class EvaluationTest : public testing::Test {
   std::unique_ptr<ParameterModel> parameters_;
   std::unique_ptr<ObjectiveAggregator> aggregator_;
   std::unique_ptr<ModelRunner> runner_;
+  int foldersToKeep_ = 0;
   std::unique_ptr<FailedRunPolicy> failedRuns_;
+  std::unique_ptr<EarlierEvaluations> earlier_;
   std::unique_ptr<LocalEvaluator> evaluator_;
 };
 

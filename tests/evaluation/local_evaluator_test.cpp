@@ -196,5 +196,60 @@ TEST_F(LocalEvaluatorTest, RunsRealProcesses) {
   EXPECT_EQ(folder_.read("base/simulated.csv"), series(0.0));
 }
 
+TEST_F(LocalEvaluatorTest, WhatAnEarlierRunHasEvaluatedIsNotRunAgain) {
+  FakeLauncher launcher([&](int, const std::string&) { return computes(1.0); });
+  takeUp({{1, 2.0}, {3, -4.0}, {5, 6.0}});
+  LocalEvaluator& evaluator = makeEvaluator(launcher, 2, 10);
+  auto results =
+      evaluator.evaluateParameterSets(std::vector<ParameterSet>{{2.0}, {3.0}, {4.0}, {1.5}}, DispatchMode::task);
+  EXPECT_THAT(measuresOf(results), ElementsAre(1.0, 2.0, 3.0, 0.5));
+  EXPECT_EQ(results[0].aggregate, 1.0);
+  EXPECT_EQ(results[2].failure->reason, "in the past");
+  EXPECT_EQ(failedRuns_->failedCount(), 1);
+  EXPECT_EQ(launcher.starts, 2);
+  EXPECT_THAT(observer_.events,
+              testing::ElementsAre(
+                  "replay 1 a=2 OK", "replay 3 a=4 FAILED", "Evaluation of parameter set No. 2 initiated",
+                  "Evaluation of parameter set No. 4 initiated", "Evaluation of parameter set No. 2 completed: OK",
+                  "record 2 a=3 OK", "Evaluation of parameter set No. 4 completed: OK", "record 4 a=1.5 OK"));
+  // A final run is made for its folder, but has its row already.
+  results = evaluator.evaluateParameterSets(std::vector<ParameterSet>{{6.0}}, DispatchMode::finalRun);
+  EXPECT_EQ(launcher.starts, 3);
+  EXPECT_EQ(observer_.events.back(), "replay 5 a=6 OK");
+}
+
+TEST_F(LocalEvaluatorTest, AnotherSetUnderTheSameNumberIsNoReplay) {
+  FakeLauncher launcher([&](int, const std::string&) { return computes(1.0); });
+  takeUp({{2, 3.0}});
+  LocalEvaluator& evaluator = makeEvaluator(launcher, 1, 10);
+  const double next = std::nextafter(3.0, 4.0);
+  try {
+    evaluator.evaluateParameterSets(std::vector<ParameterSet>{{1.0}, {next}}, DispatchMode::task);
+    ADD_FAILURE() << "took another set's result";
+  } catch (const FatalError& error) {
+    EXPECT_EQ(error.message(), "Error: Unable to continue the earlier run");
+    EXPECT_THAT(error.detail(), testing::StartsWith("evaluation No. 2 has a = 3 in the earlier results, and "
+                                                    "3.0000000000000004 now, though the settings are the same."));
+  }
+}
+
+TEST_F(LocalEvaluatorTest, TheFoldersOfTheFirstFailedRunsAreKept) {
+  description_.failedFolderPrefix = folder_ / "run_Failed";
+  foldersToKeep_ = 3;
+  FakeLauncher launcher([&](int, const std::string& folder) {
+    std::ofstream(folder + "/mirevo_batch.log") << "why";
+    return fails(1.0);
+  });
+  takeUp({{1, -4.0}});
+  LocalEvaluator& evaluator = makeEvaluator(launcher, 1, 100);
+  const std::vector<ParameterSet> sets{{4.0}, {9.5}, {2.0}, {3.0}, {1.0}};
+  evaluator.evaluateParameterSets(sets, DispatchMode::task);
+  EXPECT_FALSE(folder_.exists("run_Failed1")) << "of the earlier run";
+  EXPECT_FALSE(folder_.exists("run_Failed2")) << "no model run";
+  EXPECT_EQ(folder_.read("run_Failed3/mirevo_batch.log"), "why");
+  EXPECT_THAT(folder_.read("run_Failed4/parameters.txt"), testing::EndsWith(" 3\n"));
+  EXPECT_FALSE(folder_.exists("run_Failed5"));
+}
+
 }  // namespace
 }  // namespace mirevo

@@ -169,7 +169,7 @@ TEST_F(ModelRunTest, ARunThatMeetsFewerObservationsThanAnyBeforeIsNamedInAWarnin
   FailedRunPolicy failedRuns(10);
   EvaluationLedger ledger(observer_, failedRuns);
   const std::vector<ParameterSet> sets(std::size(cases), {2.0});
-  ledger.begin(sets);
+  ledger.begin(sets, DispatchMode::task);
   std::string last;
   for (const auto& c : cases) {
     writes("simulated.csv", std::string("time,flow\n") + c.simulated);
@@ -211,14 +211,17 @@ TEST_F(ModelRunTest, SavedFilesAreThoseThatTheRunWrote) {
   EvaluationResult result = evaluate(2.0);
   runner_->keepOutputFiles(1, 8, result);
   EXPECT_EQ(folder_.read("run_Saved/8/out/state.txt"), "by the run");
-  // A folder in the place of the copy: the warning names the file and the reason, and nothing half-written stays.
-  std::filesystem::create_directories(folder_ / "run_Saved/9/simulated.csv/x");
+  // What a run that was cut off has kept of the evaluation goes; a file in the place of the folder is a reason not to.
+  folder_.write("run_Saved/9/out/state.txt", "by a run that was cut off");
   writes("simulated.csv", series(4.0));
   result = evaluate(2.0);
   runner_->keepOutputFiles(1, 9, result);
-  EXPECT_THAT(result.warnings,
-              testing::Contains((folder_ / "run_Process1/simulated.csv") + " was not kept: Is a directory"));
-  EXPECT_FALSE(folder_.exists("run_Saved/9/simulated.csv.part"));
+  EXPECT_FALSE(folder_.exists("run_Saved/9/out/state.txt"));
+  std::filesystem::rename(folder_ / "run_Saved", folder_ / "other");
+  folder_.write("run_Saved", "");
+  runner_->keepOutputFiles(1, 9, result);
+  EXPECT_THAT(result.warnings, testing::Contains((folder_ / "run_Process1/simulated.csv") +
+                                                 " was not kept: " + (folder_ / "run_Saved/9") + ": Not a directory"));
 }
 
 TEST_F(ModelRunTest, NumericIdTemplatesAreConvertedIntoTheSlotsAlone) {

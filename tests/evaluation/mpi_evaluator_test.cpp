@@ -17,12 +17,15 @@ using testing::HasSubstr;
 class MpiEvaluatorTest : public EvaluationTest {
  protected:
   MpiEvaluatorTest() : launcher_([](int, const std::string&) { return FakeLauncher::Batch{}; }) {
-    channel_.onSend = [this](const Message& message) { running_[message.rank] = decodeSet(message.content).set.at(0); };
+    channel_.onSend = [this](const Message& message) {
+      if (message.tag != static_cast<int>(RankMessage::set)) return;
+      running_[message.rank] = decodeSet(message.content).set.at(0);
+    };
   }
   MpiEvaluator& makeMaster(int planned = 100) {
     makeRunner(launcher_, 0);
-    failedRuns_ = std::make_unique<FailedRunPolicy>(planned);
-    master_ = std::make_unique<MpiEvaluator>(*runner_, channel_, observer_, *failedRuns_);
+    failedRuns_ = std::make_unique<FailedRunPolicy>(planned, foldersToKeep_);
+    master_ = std::make_unique<MpiEvaluator>(*runner_, channel_, observer_, *failedRuns_, earlier_.get());
     return *master_;
   }
   void becomeReady(int rank) { channel_.deliver(rank, RankMessage::ready, encode(ReadyMessage{"node", "/folder"})); }
@@ -166,6 +169,31 @@ TEST_F(MpiEvaluatorTest, StoppingGoesInRankOrderAndEndsWithTheLastFarewell) {
   EXPECT_EQ(channel_.sent[1].tag, static_cast<int>(RankMessage::stop));
   channel_.deliver(1, RankMessage::farewell, {});
   EXPECT_FALSE(stopWorkers(channel_, 5.0, warn));  // the other one says nothing
+}
+
+TEST_F(MpiEvaluatorTest, WhatAnEarlierRunHasEvaluatedNeedsNoWorker) {
+  takeUp({{1, 2.0}, {2, 3.0}});
+  MpiEvaluator& master = makeMaster();
+  const auto results = master.evaluateParameterSets(std::vector<ParameterSet>{{2.0}, {3.0}}, DispatchMode::task);
+  EXPECT_EQ(results[1].aggregate, 2.0);
+  EXPECT_THAT(channel_.sent, testing::IsEmpty());
+}
+
+TEST_F(MpiEvaluatorTest, TheWorkerOfAnEarlyFailureIsToldToKeepItsFolder) {
+  foldersToKeep_ = 1;
+  MpiEvaluator& master = makeMaster();
+  becomeReady(1);
+  channel_.onReceive = [this](double) {
+    if (running_.erase(1) == 0) return;
+    ResultMessage message;
+    message.result.measureValues = message.result.objectiveValues = {kFailedRunValue};
+    message.result.failure = EvaluationFailure{EvaluationFailure::Kind::timedOut, "too long", {}};
+    channel_.deliver(1, RankMessage::result, encode(message));
+  };
+  master.evaluateParameterSets(std::vector<ParameterSet>{{2.0}, {3.0}}, DispatchMode::task);
+  ASSERT_EQ(channel_.sent.size(), 3U);  // set, keep, set
+  EXPECT_EQ(channel_.sent[1].tag, static_cast<int>(RankMessage::keepFolder));
+  EXPECT_EQ(decodeKeepFolder(channel_.sent[1].content).number, 1);
 }
 
 }  // namespace

@@ -56,6 +56,22 @@ TEST_F(MpiWorkerTest, AnswersEachSetUntilItIsToldToStop) {
   EXPECT_EQ(launcher_.starts, 2);
 }
 
+TEST_F(MpiWorkerTest, KeepsTheFolderOfItsLastRunWhereTheMasterSaysSo) {
+  description_.failedFolderPrefix = folder_ / "run_Failed";
+  makeRunner(launcher_, 1);
+  sets_ = {2.0, 3.0};
+  const auto sendNext = channel_.onSend;
+  channel_.onSend = [this, sendNext](const Message& message) {
+    if (message.tag == static_cast<int>(RankMessage::result) && sets_.size() == 1) {
+      channel_.deliver(0, RankMessage::keepFolder, encode(KeepFolderMessage{17}));
+    }
+    sendNext(message);
+  };
+  runWorkerLoop(channel_, *runner_);
+  EXPECT_THAT(folder_.read("run_Failed17/parameters.txt"), testing::EndsWith(" 2\n"));
+  EXPECT_THAT(sentTags(), ElementsAre(RankMessage::ready, RankMessage::result, RankMessage::result));
+}
+
 TEST_F(MpiWorkerTest, StopEndsAModelThatRuns) {
   sets_ = {2.0, 2.0, 2.0};
   channel_.onReceive = [this](double) {

@@ -81,7 +81,8 @@ class PosixProcessLauncherTest : public testing::Test {
 
   TemporaryFolder folder_;
   LauncherSettings settings_;
-  PosixProcessLauncher launcher_;
+  double now_ = 0.0;  ///< the launcher's clock, which the test moves
+  PosixProcessLauncher launcher_{[this] { return now_; }};
 };
 
 TEST_F(PosixProcessLauncherTest, EndsAreToldApart) {
@@ -369,6 +370,52 @@ TEST_F(PosixProcessLauncherTest, NeverRemovesTheModelItself) {
 TEST_F(PosixProcessLauncherTest, ResistanceUpdateLooksAtTheEndingFirst) {
   EXPECT_EQ(launcher_.r35UpdateResistanceNumbers("/m/river.qcs"), ResistanceUpdate::wrongExtension);
   EXPECT_EQ(launcher_.r35UpdateResistanceNumbers("/m/river.QCSR"), ResistanceUpdate::libraryNotFound);
+}
+
+/// The time is that of the whole batch, so that the second item is ended in its own 30th second.
+TEST_F(PosixProcessLauncherTest, ABatchThatRunsTooLongIsEndedWithAllThatItStarted) {
+  const struct {
+    const char* options;
+    bool needsKill;
+  } cases[] = {{"--sleep-ms 60000", false}, {"--sleep-ms 60000 --ignore-term 1 --grandchild grandchild.pid", true}};
+  for (const auto& c : cases) {
+    settings_.batchItems.clear();
+    addModel("", "quick.sh");
+    addModel(c.options, "slow.sh");
+    settings_.maxSeconds = 100.0;
+    now_ = 1e6;
+    initialise();
+    std::int32_t executing = 1;
+    std::int32_t status = 0;
+    const auto look = [&] {
+      launcher_.isExecuting(1, executing, status);
+      return executing != 0;
+    };
+    launcher_.createProcesses(1);
+    now_ += 70.0;
+    ASSERT_TRUE(comesTrue([&] { return look() && (!c.needsKill || hasContent("run_Process1/grandchild.pid")); }));
+    now_ += 30.0;
+    EXPECT_TRUE(look()) << "exactly the time that it may take";
+    now_ += 0.5;
+    look();
+    if (c.needsKill) {
+      now_ += settings_.graceSeconds - 0.1;
+      launcher_.waitForChange(0.05);
+      EXPECT_TRUE(look()) << "within the grace time";
+      now_ += 0.2;
+    }
+    EXPECT_EQ(finish(1), BatchStatus::failed);
+    EXPECT_EQ(launcher_.failure(1).kind, BatchFailure::Kind::timedOut);
+    EXPECT_EQ(launcher_.failure(1).detail, "slow.sh was ended because it ran longer than 100 seconds");
+    if (c.needsKill) {
+      const pid_t grandchild = std::atoi(read("grandchild.pid").c_str());
+      EXPECT_TRUE(comesTrue([&] { return isGone(grandchild); }));
+    }
+  }
+  settings_.batchItems.clear();
+  addModel("");
+  initialise();
+  EXPECT_EQ(run(), BatchStatus::succeeded) << "the next run has its own time";
 }
 
 }  // namespace

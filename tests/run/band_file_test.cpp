@@ -16,8 +16,8 @@ TEST(BandFile, IsATimeSeriesThatOurOwnReaderTakes) {
   const ObservedSeries observed{0, {2001, 2, 28, 23, 50, 0}, {0.0, 1.0 / 144.0, 1.5}, {0.1F, -2.0, 3.0}};
   const SeriesBand band{{1.0, nan, 3.0}, {4.0, nan, 6.5}, {7.0, nan, 1e-12}, 2, 0.5};
   const std::string path = (folder / "x_Band_1.csv");
-  writeBandFile(path, "Low\nflow", observed, band);
-  writeBandFile(path, "Low\nflow", observed, band);
+  for (const char* title : {"Low\nwater", "Low\nflow", "Low\nflow"}) writeBandFile(path, title, observed, band);
+  EXPECT_FALSE(folder.exists("x_Band_1.2.csv")) << "the same file again";
   EXPECT_TRUE(folder.exists("x_Band_1.1.csv"));
   std::string reason;
   const auto series = createTimeSeriesObject(path, reason);

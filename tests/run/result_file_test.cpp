@@ -140,9 +140,9 @@ TEST(FailedRunFile, AppearsWithTheFirstFailureAndSaysWhatHappened) {
   file.add(values, silent);
   EXPECT_EQ(folder.read("calSimErr.dat"),
             "# Failed evaluations of basin\n"
-            "\nEvaluation No. 4\n   run.sh exited with code 3\n   k = 0.1\n   n = 2\n"
+            "\nEvaluation No. 4 (batch ended with an exit code)\n   run.sh exited with code 3\n   k = 0.1\n   n = 2\n"
             "   Last output:\n   | a\n   | b\n"
-            "\nEvaluation No. 9\n   run.sh exited with code 3\n   k = 0.1\n   n = 2\n");
+            "\nEvaluation No. 9 (batch ended with an exit code)\n   run.sh exited with code 3\n   k = 0.1\n   n = 2\n");
 }
 
 }  // namespace

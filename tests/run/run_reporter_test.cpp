@@ -113,7 +113,8 @@ TEST_F(RunReporterTest, AnEvaluationReachesResultFileLogProgressAndTheFileOfFail
   EXPECT_EQ(folder_.read("s.log"), "Evaluation of parameter set No. 1 initiated\n   run.sh exited with code 3\n");
   EXPECT_THAT(folder_.read("s._spi_"), HasSubstr("MESSAGEvaluation of parameter set No. 1 initiated\n"));
   EXPECT_THAT(folder_.read("s._spi_"), HasSubstr("PROGRE50.0\n"));
-  EXPECT_THAT(folder_.read("calSimErr.dat"), HasSubstr("Evaluation No. 2\n   run.sh exited with code 3\n   k = 1\n"));
+  EXPECT_THAT(folder_.read("calSimErr.dat"),
+              HasSubstr("Evaluation No. 2 (batch ended with an exit code)\n   run.sh exited with code 3\n   k = 1\n"));
   EXPECT_EQ(reporter_.failedCount(), 1);
   EXPECT_EQ(state_.objectiveValues, std::vector<double>{kFailedRunValue});
 }

@@ -1,0 +1,27 @@
+#pragma once
+
+#include <map>
+#include <string>
+#include <vector>
+
+#include "evaluation/evaluation_result.h"
+
+namespace mirevo {
+
+/// Why the evaluations of a run failed, and how often for each reason.
+class FailureSummary final {
+ public:
+  void add(int number, const EvaluationFailure& failure);
+  /// A line a kind of failure, the most frequent first, with the reason of the first evaluation that failed so.
+  std::vector<std::string> lines() const;
+
+ private:
+  struct Count {
+    int count = 0;
+    int firstNumber = 0;
+    std::string firstReason;
+  };
+  std::map<EvaluationFailure::Kind, Count> counts_;
+};
+
+}  // namespace mirevo
