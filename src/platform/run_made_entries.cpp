@@ -26,7 +26,7 @@ struct Ending {
   bool mayBeModels = false;  ///< so plain a name that only the content tells
 };
 
-constexpr std::array<Ending, 13> kEndings = {{
+constexpr std::array<Ending, 14> kEndings = {{
     {"", ".log", false, true},
     {"", ".dat", false, true},
     {"", "._spi_"},
@@ -36,6 +36,7 @@ constexpr std::array<Ending, 13> kEndings = {{
     {"_Series", ".dat"},
     {"_Restart", ".dat"},
     {"_Report", ".html"},
+    {"_Termination", ".log"},
     {"_Band_", ".csv", true},
     {"_Saved", ""},
     {"_Failed", "", true},

@@ -78,9 +78,10 @@ struct RunConfig {
   bool useSingleThread = false;
   std::string processFolder;  ///< where the process folders are made; empty: beside the setup
 
-  /// Model evaluations that the task plans; sizes the failed-run limit and the progress report. 0 where the simulation
-  /// option names no task.
+  /// Model evaluations that the task plans; sizes the failed-run limit. 0 where the simulation option names no task.
   int plannedEvaluations() const;
+  /// These and the final model run of a search: what progress counts towards.
+  int plannedModelRuns() const;
   /// Whether the task's results depend on the random seed.
   bool drawsRandomNumbers() const;
   std::size_t variableParameterCount() const;
