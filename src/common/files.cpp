@@ -7,21 +7,10 @@
 #include <unistd.h>
 
 #include "common/descriptor.h"
+#include "common/descriptor_output.h"
 
 namespace mirevo {
 namespace {
-
-bool writeAll(int fd, std::string_view content) {
-  while (!content.empty()) {
-    const ssize_t written = ::write(fd, content.data(), content.size());
-    if (written < 0) {
-      if (errno == EINTR) continue;
-      return false;
-    }
-    content.remove_prefix(static_cast<std::size_t>(written));
-  }
-  return true;
-}
 
 /// Why something on disk is no file to read or write: reading a device or a pipe may never end. Empty for a file.
 std::string faultOfKind(const struct stat& status) {
@@ -70,11 +59,13 @@ bool writeByUnlinkAndCreate(const std::string& path, std::string_view content, u
     return false;
   }
   const Descriptor file(::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, mode & 07777));
-  if (file.get() < 0 || ::fchmod(file.get(), mode & 07777) != 0 || !writeAll(file.get(), content)) {
+  if (file.get() < 0 || ::fchmod(file.get(), mode & 07777) != 0) {
     reason = std::strerror(errno);
     return false;
   }
-  return true;
+  const int error = writeWhole(file.get(), content).error;
+  if (error != 0) reason = std::strerror(error);
+  return error == 0;
 }
 
 }  // namespace mirevo

@@ -160,7 +160,10 @@ bool PosixProcessLauncher::initialise(const LauncherSettings& settings) {
     if (!guard_->start(*groups_, mark_, reason))
       fatalError("Unable to start the guard of the model's processes: " + reason);
     slots_.reserve(static_cast<std::size_t>(settings.slotCount));
-    for (int number = 1; number <= settings.slotCount; ++number) prepareSlot(settings, number, arguments);
+    for (int number = 1; number <= settings.slotCount; ++number) {
+      if (settings.isCancelled && settings.isCancelled()) throw RunCancelled();
+      prepareSlot(settings, number, arguments);
+    }
   } catch (const FatalError& error) {
     lastError_ = error.message();
     return false;

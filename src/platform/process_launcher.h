@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstdint>
+#include <functional>
 #include <string>
 #include <vector>
 
@@ -17,10 +18,11 @@ struct LauncherSettings {
   std::string processFolderPrefix;    ///< absolute; a slot runs in this text followed by its folder's number
   std::vector<BatchItem> batchItems;  ///< at least one
   int slotCount = 1;
-  int firstFolderNumber = 1;     ///< the number of slot 1's folder; the other slots' follow
-  bool useSingleThread = false;  ///< set the usual thread-count variables to 1 for the model
-  double graceSeconds = 2.0;     ///< between SIGTERM and SIGKILL when processes are halted
-  double maxSeconds = 0.0;       ///< longest time that a slot's batch may run, all of its items together; 0: any
+  int firstFolderNumber = 1;               ///< the number of slot 1's folder; the other slots' follow
+  bool useSingleThread = false;            ///< set the usual thread-count variables to 1 for the model
+  std::function<bool()> isCancelled = {};  ///< asked between two slots' folders; true throws RunCancelled
+  double graceSeconds = 2.0;               ///< between SIGTERM and SIGKILL when processes are halted
+  double maxSeconds = 0.0;  ///< longest time that a slot's batch may run, all of its items together; 0: any
 };
 
 /// How a slot's batch ended, or that it has not yet.

@@ -26,7 +26,7 @@ struct Ending {
   bool mayBeModels = false;  ///< so plain a name that only the content tells
 };
 
-constexpr std::array<Ending, 17> kEndings = {{
+constexpr std::array<Ending, 18> kEndings = {{
     {"", ".log", false, true},
     {"", ".dat", false, true},
     {"", "._spi_"},
@@ -40,6 +40,7 @@ constexpr std::array<Ending, 17> kEndings = {{
     {"_Simulated", ".bin"},
     {"_Sensitivity_Simulated", ".bin"},
     {"_Report", ".html"},
+    {"_Termination", ".log"},
     {"_Band_", ".csv", true},
     {"_Saved", ""},
     {"_Failed", "", true},

@@ -1,6 +1,5 @@
 #include "platform/terminal.h"
 
-#include <cerrno>
 #include <cstdlib>
 #include <signal.h>
 #include <string>
@@ -9,6 +8,7 @@
 #include <termios.h>
 #include <unistd.h>
 
+#include "common/descriptor_output.h"
 #include "common/text.h"
 
 namespace mirevo {
@@ -22,6 +22,18 @@ std::string_view environmentValue(const char* name) {
   return value == nullptr ? std::string_view{} : std::string_view(value);
 }
 
+bool knowsControlSequences() {
+  const std::string_view type = environmentValue("TERM");
+  return !type.empty() && type != "dumb";
+}
+
+sigset_t queuedSignals() {
+  sigset_t signals;
+  ::sigemptyset(&signals);
+  for (const int number : {SIGINT, SIGTERM, SIGHUP, SIGQUIT, SIGWINCH, SIGCONT, SIGCHLD}) ::sigaddset(&signals, number);
+  return signals;
+}
+
 }  // namespace
 
 bool hasKeyboard() {
@@ -29,8 +41,7 @@ bool hasKeyboard() {
 }
 
 bool hasScreenTerminal() {
-  const std::string_view type = environmentValue("TERM");
-  return hasKeyboard() && ::isatty(STDOUT_FILENO) == 1 && !type.empty() && type != "dumb";
+  return hasKeyboard() && ::isatty(STDOUT_FILENO) == 1 && knowsControlSequences();
 }
 
 bool wantsUtf8() {
@@ -43,17 +54,11 @@ bool wantsUtf8() {
 }
 
 bool wantsColour() {
-  return environmentValue("NO_COLOR").empty();
+  return environmentValue("NO_COLOR").empty() && knowsControlSequences();
 }
 
 bool writeToOutput(std::string_view text) {
-  while (!text.empty()) {
-    const ssize_t written = ::write(STDOUT_FILENO, text.data(), text.size());
-    if (written < 0 && errno == EINTR) continue;
-    if (written < 0) return false;
-    text.remove_prefix(static_cast<std::size_t>(written));
-  }
-  return true;
+  return writeWhole(STDOUT_FILENO, text).error == 0;
 }
 
 struct TerminalScreen::Settings {
@@ -97,12 +102,17 @@ TerminalScreen::Size TerminalScreen::size() {
 }
 
 SignalQueue::SignalQueue() {
-  sigset_t signals;
-  ::sigemptyset(&signals);
-  for (const int number : {SIGINT, SIGTERM, SIGHUP, SIGQUIT, SIGWINCH, SIGCONT, SIGCHLD}) ::sigaddset(&signals, number);
-  ::sigprocmask(SIG_BLOCK, &signals, nullptr);
+  block();
+  const sigset_t signals = queuedSignals();
   descriptor_ = ::signalfd(-1, &signals, SFD_CLOEXEC | SFD_NONBLOCK);
   ::signal(SIGPIPE, SIG_IGN);  // an output that nobody reads any more is noticed when it is written to
+}
+
+sigset_t SignalQueue::block() {
+  const sigset_t signals = queuedSignals();
+  sigset_t before;
+  ::sigprocmask(SIG_BLOCK, &signals, &before);
+  return before;
 }
 
 SignalQueue::~SignalQueue() {

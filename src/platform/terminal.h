@@ -1,5 +1,6 @@
 #pragma once
 
+#include <csignal>
 #include <memory>
 #include <string_view>
 
@@ -15,7 +16,7 @@ bool hasKeyboard();
 /// Whether the environment asks for a locale with UTF-8 characters (LC_ALL, LC_CTYPE, LANG, in this order).
 bool wantsUtf8();
 
-/// Whether colour is welcome: NO_COLOR is not set, or empty.
+/// Whether colour is welcome on a terminal: NO_COLOR is not set, or empty, and TERM is set and not "dumb".
 bool wantsColour();
 
 /// Writes to standard output, whole; false when nobody takes it any more.
@@ -55,6 +56,9 @@ class SignalQueue final {
   ~SignalQueue();
   SignalQueue(const SignalQueue&) = delete;
   SignalQueue& operator=(const SignalQueue&) = delete;
+
+  /// Blocks them ahead of time, so that none is missed before there is a queue. Returns what was blocked before.
+  static sigset_t block();
 
   int descriptor() const { return descriptor_; }
   /// The next one, 0 when there is none.

@@ -9,7 +9,9 @@
 
 #include <fmt/format.h>
 
+#include "common/descriptor_output.h"
 #include "common/text.h"
+#include "run/signal_state.h"
 
 namespace mirevo {
 namespace {
@@ -19,6 +21,9 @@ constexpr int kStandardOutput = 0;
 constexpr std::string_view kMessageFileEnding = "._spi_";
 constexpr std::string_view kKillFileEnding = "._kill_";
 constexpr std::size_t kSpeedWindow = 100;  ///< evaluations
+/// For a pipe or terminal to take a record. One that took none in that time is not waited for until it takes one again,
+/// so that a reader who has stopped reading does not slow the run.
+constexpr int kPatienceMilliseconds = 1000;
 
 std::string baseNameOf(std::string_view runFileName) {
   for (const std::string_view ending : {".log", ".inp"}) {
@@ -29,23 +34,20 @@ std::string baseNameOf(std::string_view runFileName) {
   return std::string(runFileName);
 }
 
-/// One write(2), so that a viewer that reads along never sees half a record of an ordinary disk file.
-bool writeWhole(int descriptor, std::string_view record) {
-  while (!record.empty()) {
-    const ssize_t written = ::write(descriptor, record.data(), record.size());
-    if (written < 0 && errno == EINTR) continue;
-    if (written < 0) return false;
-    record.remove_prefix(static_cast<std::size_t>(written));
-  }
-  return true;
-}
-
 }  // namespace
 
 ProgressReporter::ProgressReporter(Clock clock) : clock_(std::move(clock)) {}
 
 ProgressReporter::~ProgressReporter() {
-  if (messageUnit_ > kStandardOutput) ::close(messageUnit_);
+  closeMessageFile();
+}
+
+void ProgressReporter::closeMessageFile() {
+  if (messageUnit_ > kStandardOutput) {
+    signalState.messageFileDescriptor = -1;
+    ::close(messageUnit_);
+  }
+  messageUnit_ = kNowhere;
 }
 
 std::string ProgressReporter::progressInit(std::string_view runFileName, std::string_view destination) {
@@ -61,8 +63,11 @@ std::string ProgressReporter::progressInit(std::string_view runFileName, std::st
     messageUnit_ = kStandardOutput;
   } else {
     const std::string messageFile = baseName_ + std::string(kMessageFileEnding);
-    messageUnit_ = ::open(messageFile.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0666);
-    if (messageUnit_ < 0) {
+    // Without O_NONBLOCK the opening of a pipe would wait for its reader.
+    messageUnit_ = ::open(messageFile.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_APPEND | O_CLOEXEC | O_NONBLOCK, 0666);
+    if (messageUnit_ >= 0) {
+      signalState.messageFileDescriptor = messageUnit_;
+    } else {
       if (!problems.empty()) problems += '\n';
       problems += fmt::format("Unable to open TqQmon2 message file: {}: {}", messageFile, std::strerror(errno));
     }
@@ -83,11 +88,14 @@ void ProgressReporter::writeRecord(std::string_view kind, std::string_view text)
   std::replace_if(
       record.begin(), record.end(), [](char c) { return c == '\n' || c == '\r'; }, ' ');
   record += '\n';
+  if (isLineUnfinished_) record.insert(record.begin(), '\n');
   const int descriptor = messageUnit_ == kStandardOutput ? STDOUT_FILENO : messageUnit_;
-  if (writeWhole(descriptor, record)) return;
+  // One write(2), so that a viewer that reads along never sees half a record of an ordinary disk file.
+  const OutputResult result = writeWhole(descriptor, record, isReaderBusy_ ? 0 : kPatienceMilliseconds);
+  isReaderBusy_ = result.error == EAGAIN;  // the record is lost
+  if (result.taken > 0) isLineUnfinished_ = result.taken < record.size();
   // A full disk or a closed pipe ends the reporting and not the run.
-  if (messageUnit_ > kStandardOutput) ::close(messageUnit_);
-  messageUnit_ = kNowhere;
+  if (result.error != 0 && !isReaderBusy_) closeMessageFile();
 }
 
 void ProgressReporter::writeStatus(std::string_view text) {
@@ -157,8 +165,7 @@ void ProgressReporter::progressBest(int number, double aggregate, std::string_vi
 void ProgressReporter::progressEnd(std::string_view ending) {
   writeStatus(fmt::format("Ended: {}", ending));
   writeProgress("100.0");
-  if (messageUnit_ > kStandardOutput) ::close(messageUnit_);
-  messageUnit_ = kNowhere;
+  closeMessageFile();
 }
 
 bool ProgressReporter::isCancelled() {

@@ -51,10 +51,13 @@ class ProgressReporter final {
 
  private:
   void writeRecord(std::string_view kind, std::string_view text);
+  void closeMessageFile();
 
   Clock clock_;
   std::string baseName_;
-  int messageUnit_ = -1;  ///< < 0 nowhere, 0 standard output, > 0 the message file's descriptor
+  int messageUnit_ = -1;           ///< < 0 nowhere, 0 standard output, > 0 the message file's descriptor
+  bool isReaderBusy_ = false;      ///< it has not taken the latest record
+  bool isLineUnfinished_ = false;  ///< it has taken a part of the latest that it took any of
   bool cancelled_ = false;
   int plannedEvaluations_ = 0;
   int completedEvaluations_ = 0;

@@ -12,6 +12,7 @@
 #include "common/descriptor.h"
 #include "common/fatal_error.h"
 #include "common/files.h"
+#include "run/signal_handlers.h"
 
 namespace mirevo {
 namespace {
@@ -57,6 +58,7 @@ bool RecordFile::tryAppend(std::string_view record, std::string& reason) {
     reason = "the file is closed";
     return false;
   }
+  const EndingSignalsHeld held;  // a signal's closing line comes behind a whole record
   const std::size_t length = record.size();
   while (!record.empty()) {
     const ssize_t written = ::write(descriptor_, record.data(), record.size());

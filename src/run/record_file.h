@@ -32,6 +32,7 @@ class RecordFile final {
 
   bool isOpen() const { return descriptor_ >= 0; }
   const std::string& path() const { return path_; }
+  int descriptor() const { return descriptor_; }
   /// Bytes written so far.
   std::int64_t size() const { return size_; }
 

@@ -43,6 +43,8 @@ class ResultFile final {
 
   bool isOpen() const { return file_.isOpen(); }
   const std::string& path() const { return file_.path(); }
+  /// For signal handlers: -1 while no file is open.
+  int descriptor() const { return file_.descriptor(); }
 
  private:
   struct Row {

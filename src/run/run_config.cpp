@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <filesystem>
+#include <limits>
 #include <system_error>
 
 #include "common/text.h"
@@ -33,6 +34,12 @@ int RunConfig::plannedEvaluations() const {
       return uncertainty.sampleSize;
   }
   return 0;
+}
+
+int RunConfig::plannedModelRuns() const {
+  const int planned = plannedEvaluations();
+  const bool isSearch = simulationOption == SimulationOption::parameterOptimisation;
+  return isSearch && planned < std::numeric_limits<int>::max() ? planned + 1 : planned;
 }
 
 SetupLocation locateSetup(const std::string& fileName) {

@@ -98,9 +98,10 @@ struct RunConfig {
   std::int32_t failedRunFolders = 3;  ///< failed model runs whose process folder is kept
   std::vector<ResultSetting> resultSettings;  ///< in reading order; what may not change when a run is taken up again
 
-  /// Model evaluations that the task plans; sizes the failed-run limit and the progress report. 0 where the simulation
-  /// option names no task.
+  /// Model evaluations that the task plans; sizes the failed-run limit. 0 where the simulation option names no task.
   int plannedEvaluations() const;
+  /// These and the final model run of a search: what progress counts towards.
+  int plannedModelRuns() const;
   /// Whether the task's results depend on the random seed.
   bool drawsRandomNumbers() const;
   std::size_t variableParameterCount() const;

@@ -7,6 +7,7 @@
 #include <fmt/format.h>
 
 #include "common/fatal_error.h"
+#include "common/files.h"
 #include "common/text.h"
 #include "evaluation/local_evaluator.h"
 #include "evaluation/mpi_evaluator.h"
@@ -18,6 +19,7 @@
 #include "run/setup_warnings.h"
 #include "run/signal_handlers.h"
 #include "run/signal_state.h"
+#include "run/stop_run.h"
 #include "run/tasks.h"
 #include "run/version.h"
 #include "run/worker_run.h"
@@ -43,6 +45,7 @@ RunDriver::RunDriver() = default;
 
 RunDriver::~RunDriver() {
   signalState.runLogDescriptor = -1;
+  signalState.resultFileDescriptor = -1;
 }
 
 int RunDriver::run(const std::string& setupFileName) {
@@ -59,7 +62,7 @@ int RunDriver::run(const std::string& setupFileName) {
     if (state_.mpiInUse) beginWorkers(state_.mpi, {config_.setupFile, setupText});
     state_.progress.writeMessage("Title: " + config_.title);
     state_.progress.writeStatus(taskName(config_));
-    state_.progress.progressEvaluationLabel(config_.plannedEvaluations());
+    state_.progress.progressEvaluationLabel(config_.plannedModelRuns());
     finish(runTask({config_, parameters_->searchSpace(), *evaluator_, state_.log,
                     [this](const SearchSummary& summary) { reporter_->takeBestOf(summary); }, filePrefix_,
                     runner_->observedSeries()}));
@@ -80,6 +83,11 @@ void RunDriver::openRun(const std::string& setupFileName) {
   installSignalHandlers();
   const SetupLocation setup = locateSetup(setupFileName);
   filePrefix_ = setup.folder + "/" + setup.name;
+  std::error_code ignored;
+  if (const std::string fault = faultOfFile(setup.file);
+      !fault.empty() && std::filesystem::exists(setup.file, ignored)) {
+    fatalError("Error: Unable to open " + setup.file, fault);  // before files are made beside it: it may be in /dev
+  }
   if (!lock_.take(setup.file, kPatienceSeconds)) {
     fatalError("Error: Another run of this setup is in progress",
                setup.file + ": both would work in the same folders. Wait for it, or run a copy under another name.");
@@ -93,10 +101,14 @@ void RunDriver::openRun(const std::string& setupFileName) {
   state_.log.line("Setup file: " + setup.file);
   if (!keptLog.empty()) state_.log.line("The log of the earlier run was kept as " + keptLog);
 
-  const std::string problems = state_.progress.progressInit(logFile, environmentValue("VOLK_PROGRESS"));
-  for (const std::string_view problem : splitLines(problems)) {
-    state_.log.warning(problem);
-    showMessage(problem);
+  const std::string terminationLogProblem = openTerminationLog(filePrefix_ + "_Termination.log");
+  const std::string progressProblems = state_.progress.progressInit(logFile, environmentValue("VOLK_PROGRESS"));
+  for (const std::string_view problems :
+       {std::string_view(terminationLogProblem), std::string_view(progressProblems)}) {
+    for (const std::string_view problem : splitLines(problems)) {
+      state_.log.warning(problem);
+      showMessage(problem, {}, MessageType::warning);
+    }
   }
   state_.progress.progressStart(fmt::format("{} on {}, process {}", dateAndTimeWithZone(), hostName(), ::getpid()));
 }
@@ -110,8 +122,14 @@ void RunDriver::buildModel() {
   launcher_ = std::make_unique<PosixProcessLauncher>();
   signalState.haltProcesses = haltProcessesFromSignal;
   const int slotCount = state_.mpiInUse ? 0 : config_.simultaneousSimulations;  // the master runs no model
-  runner_ = std::make_unique<ModelRunner>(describeModel(config_), *parameters_, *aggregator_, *launcher_,
-                                          launcherSettings(config_, slotCount));
+  LauncherSettings settings = launcherSettings(config_, slotCount);
+  settings.isCancelled = [this] {  // copies of a large model take their time
+    if (!state_.progress.isCancelled()) return false;
+    state_.log.line("Simulation cancelled");
+    state_.progress.writeMessage("Simulation cancelled");
+    return true;
+  };
+  runner_ = std::make_unique<ModelRunner>(describeModel(config_), *parameters_, *aggregator_, *launcher_, settings);
 }
 
 void RunDriver::logSetup() {
@@ -135,6 +153,7 @@ void RunDriver::logSetup() {
 void RunDriver::openResults() {
   state_.objectiveValues.resize(config_.objectives.size());
   results_->open(config_, runner_->observedSeries(), *aggregator_, state_.log);
+  signalState.resultFileDescriptor = results_->table().descriptor();
   reporter_ = std::make_unique<RunReporter>(state_, results_->table(), results_->failedRuns(),
                                             parameters_->searchSpace(), results_->simulatedValues());
   failedRunPolicy_.emplace(config_.plannedEvaluations(), config_.failedRunFolders);
@@ -167,6 +186,8 @@ bool RunDriver::closeResults(std::string_view terminationMessage, std::string& r
   if (reporter_) reporter_->settle(*aggregator_);
   std::vector<std::string> lines = closingLines(terminationMessage);
   lines.insert(lines.end(), report.begin(), report.end());
+  const EndingSignalsHeld held;
+  signalState.resultFileDescriptor = -1;
   return !results_ || results_->table().finish(lines, reason);
 }
 
@@ -176,8 +197,9 @@ void RunDriver::finish(const TaskOutcome& outcome) {
     fatalError("Error: Unable to write to " + results_->table().path(), reason);
   }
   state_.log.line("");
-  state_.log.line(
-      fmt::format("{} model evaluations, {} of them failed", reporter_->evaluationCount(), reporter_->failedCount()));
+  const int count = reporter_->evaluationCount();
+  state_.log.line(count == 1 ? fmt::format("1 model evaluation, {} failed", reporter_->failedCount())
+                             : fmt::format("{} model evaluations, {} of them failed", count, reporter_->failedCount()));
   if (reporter_->replayedCount() > 0) {
     state_.log.line(fmt::format("{} of them were taken from the earlier run", reporter_->replayedCount()));
   }
@@ -217,7 +239,7 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
 }
 
 int RunDriver::endCancelled(std::string_view message) {
-  showMessage(message);
+  showMessage(message, {}, MessageType::information);
   std::string reason;
   if (!closeResults(message, reason)) {
     state_.log.line(fmt::format("Error: Unable to write to {}\n{}", results_->table().path(), reason));
@@ -240,7 +262,7 @@ void RunDriver::leaveJob(int exitCode, std::string_view ending) {
   const auto warn = [this, exitCode](const std::string& text) {
     if (exitCode != 0) return;  // the run has failed already, with the first reason
     state_.log.warning(text);
-    showMessage("Warning: " + text);
+    showMessage("Warning: " + text, {}, MessageType::warning);
   };
   try {
     if (stopWorkers(state_.mpi, exitCode == 0 ? kWorkerPatienceSeconds : kWorkerStopSeconds, warn)) {
@@ -250,7 +272,7 @@ void RunDriver::leaveJob(int exitCode, std::string_view ending) {
   } catch (const FatalError& error) {
     reason = error.message() + "\n" + error.detail();
   }
-  showMessage("Warning: All processes of the MPI job are aborted: " + reason);
+  showMessage("Warning: All processes of the MPI job are aborted: " + reason, {}, MessageType::warning);
   state_.progress.progressEnd(ending);
   state_.mpi.abort(exitCode);
 }

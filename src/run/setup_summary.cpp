@@ -161,7 +161,8 @@ std::string setupSummary(const RunConfig& config, const SearchSpace& space, std:
   summary.addParameters(space, evaluationOrder);
   summary.addMeasures();
   if (config.drawsRandomNumbers()) summary.line("Random seed: {}", config.randomSeed);
-  summary.line("Model evaluations planned: {}", config.plannedEvaluations());
+  summary.line("Model evaluations planned: {}{}", config.plannedEvaluations(),
+               config.simulationOption == SimulationOption::parameterOptimisation ? " and a final model run" : "");
   summary.line("Simultaneous simulations: {}{}", config.simultaneousSimulations,
                config.useSingleThread ? ", one thread each" : "");
   return summary.text();

@@ -1,13 +1,16 @@
 #include "run/signal_handlers.h"
 
+#include <algorithm>
 #include <array>
 #include <cerrno>
 #include <cstdlib>
 #include <poll.h>
 #include <signal.h>
+#include <sys/syscall.h>
 #include <ucontext.h>
 #include <unistd.h>
 
+#include "platform/front_end.h"
 #include "run/signal_state.h"
 
 namespace mirevo {
@@ -16,10 +19,14 @@ namespace {
 /// Handlers run here, so that a stack overflow can still be reported.
 alignas(16) std::array<char, 65536> handlerStack;
 
+/// "Mirevo: ", ready for the handlers.
+std::array<char, 64> boxTitle;
+std::size_t boxTitleLength = 0;
+
 /// Writes to a terminal or pipe, but never waits for one that takes nothing (a stopped terminal).
-void showFromSignal(int descriptor, std::string_view text) noexcept {
+void showFromSignal(int descriptor, std::string_view text, std::string_view title) noexcept {
   pollfd ready{descriptor, POLLOUT, 0};
-  if (::poll(&ready, 1, 0) == 1 && (ready.revents & POLLOUT) != 0) writeLineFromSignal(descriptor, text);
+  if (::poll(&ready, 1, 0) == 1 && (ready.revents & POLLOUT) != 0) writeLineFromSignal(descriptor, text, title);
 }
 
 [[noreturn]] void endRun(int signalNumber, std::string_view message) noexcept {
@@ -31,10 +38,15 @@ void showFromSignal(int descriptor, std::string_view text) noexcept {
     writeLineFromSignal(runLog, message);
   }
   if (void (*halt)() = signalState.haltProcesses; halt != nullptr) halt();
+  if (const int results = signalState.resultFileDescriptor; results >= 0) writeLineFromSignal(results, message, "# ");
+  if (const int records = signalState.messageFileDescriptor; records >= 0) {
+    writeLineFromSignal(records, message, "STATUSEnded: ");
+    writeLineFromSignal(records, "PROGRE100.0");
+  }
   if (signalState.showsMessageBox) {
-    showFromSignal(STDERR_FILENO, message);
+    showFromSignal(STDERR_FILENO, message, {boxTitle.data(), boxTitleLength});
   } else if (signalState.writesStandardOutput) {
-    showFromSignal(STDOUT_FILENO, message);
+    showFromSignal(STDOUT_FILENO, message, {});
   }
   if (terminationLog > 0) writeLineFromSignal(terminationLog, "Abnormal completion");
   ::_exit(128 + signalNumber);
@@ -49,6 +61,7 @@ std::string_view messageOf(int signalNumber) noexcept {
     case SIGINT:
       return "Control-C send";
     case SIGSEGV:
+    case SIGBUS:
       return "Illegal storage access";
     default:
       return "Termination request";
@@ -57,6 +70,16 @@ std::string_view messageOf(int signalNumber) noexcept {
 
 extern "C" void handleSignal(int signalNumber, siginfo_t*, void*) {
   endRun(signalNumber, messageOf(signalNumber));
+}
+
+/// A library's thread may be given what is sent to the process. In the middle of a step of the main thread, which holds
+/// such signals, it hands it on to that one.
+extern "C" void handleRequest(int signalNumber, siginfo_t*, void*) {
+  signalState.isEnding = true;
+  const pid_t process = ::getpid();
+  const bool isMainThread = static_cast<pid_t>(::syscall(SYS_gettid)) == process;
+  if (isMainThread || signalState.heldSteps == 0) endRun(signalNumber, messageOf(signalNumber));
+  ::syscall(SYS_tgkill, process, process, signalNumber);
 }
 
 extern "C" void handleFloatingPoint(int signalNumber, siginfo_t* information, void* context) {
@@ -77,12 +100,24 @@ extern "C" void handleFloatingPoint(int signalNumber, siginfo_t* information, vo
 
 using SignalAction = void (*)(int, siginfo_t*, void*);
 
+/// Those that ask the run to end, rather than tell of its crash.
+constexpr std::array kRequests{SIGINT, SIGTERM, SIGHUP, SIGQUIT, SIGXCPU};
+
+bool isRequest(int signalNumber) {
+  return std::find(kRequests.begin(), kRequests.end(), signalNumber) != kRequests.end();
+}
+
+/// Whoever started the program may have blocked the signal.
 void install(int signalNumber, SignalAction handler) {
   struct sigaction action {};
   action.sa_sigaction = handler;
   action.sa_flags = SA_SIGINFO | SA_ONSTACK;
   ::sigfillset(&action.sa_mask);
   ::sigaction(signalNumber, &action, nullptr);
+  sigset_t unblocked;
+  ::sigemptyset(&unblocked);
+  ::sigaddset(&unblocked, signalNumber);
+  ::sigprocmask(SIG_UNBLOCK, &unblocked, nullptr);
 }
 
 bool isIgnored(int signalNumber) {
@@ -91,21 +126,21 @@ bool isIgnored(int signalNumber) {
          action.sa_handler == SIG_IGN;
 }
 
-std::string_view environmentValue(const char* name) {
-  const char* value = std::getenv(name);
-  return value == nullptr ? std::string_view{} : std::string_view(value);
-}
-
 }  // namespace
 
-void writeLineFromSignal(int descriptor, std::string_view text) noexcept {
+void writeLineFromSignal(int descriptor, std::string_view text, std::string_view prefix) noexcept {
   const int savedError = errno;
-  while (!text.empty()) {
-    const ssize_t written = ::write(descriptor, text.data(), text.size());
+  std::array<char, 512> line;
+  std::size_t length = 0;
+  for (const std::string_view part : {prefix, text})
+    length += part.copy(line.data() + length, line.size() - 1 - length);
+  line[length++] = '\n';
+  std::string_view rest(line.data(), length);
+  while (!rest.empty()) {
+    const ssize_t written = ::write(descriptor, rest.data(), rest.size());
     if (written < 0 && errno != EINTR) break;
-    if (written > 0) text.remove_prefix(static_cast<std::size_t>(written));
+    if (written > 0) rest.remove_prefix(static_cast<std::size_t>(written));
   }
-  if (::write(descriptor, "\n", 1) < 0) errno = savedError;
   errno = savedError;
 }
 
@@ -145,29 +180,47 @@ std::string_view floatingPointMessage(int subCode) noexcept {
 }
 
 void installSignalHandlers() {
-  const bool night = environmentValue("BUILDMODE") == "NIGHT";
-  const std::string_view frontEnd = environmentValue("G48");
+  const bool night = isUnattended();
+  const char* value = std::getenv("G48");
+  const std::string_view frontEnd = value == nullptr ? "" : value;
   signalState.showsMessageBox = !night;
   signalState.writesStandardOutput = night && frontEnd != "QMON" && frontEnd != "WIN";
+
+  boxTitleLength = (programName() + ": ").copy(boxTitle.data(), boxTitle.size());
 
   stack_t stack{};
   stack.ss_sp = handlerStack.data();
   stack.ss_size = handlerStack.size();
   ::sigaltstack(&stack, nullptr);
 
-  sigset_t handled;
-  ::sigemptyset(&handled);
   for (const int signalNumber : {SIGABRT, SIGILL, SIGINT, SIGSEGV, SIGTERM}) {
-    install(signalNumber, handleSignal);
-    ::sigaddset(&handled, signalNumber);
+    install(signalNumber, isRequest(signalNumber) ? handleRequest : handleSignal);
   }
   install(SIGFPE, handleFloatingPoint);
-  if (!isIgnored(SIGHUP)) install(SIGHUP, handleSignal);
-  // Whoever started the program may have blocked them.
-  ::sigprocmask(SIG_UNBLOCK, &handled, nullptr);
+  install(SIGBUS, handleSignal);
+  for (const int signalNumber : {SIGHUP, SIGQUIT, SIGXCPU}) {
+    if (!isIgnored(signalNumber)) install(signalNumber, handleRequest);
+  }
   // A reader of our output that goes away, or a limit on file sizes: the write that fails says so.
   ::signal(SIGPIPE, SIG_IGN);
   ::signal(SIGXFSZ, SIG_IGN);
+}
+
+EndingSignalsHeld::EndingSignalsHeld() {
+  sigset_t held;
+  ::sigemptyset(&held);
+  for (const int signalNumber : kRequests) ::sigaddset(&held, signalNumber);
+  ::sigprocmask(SIG_BLOCK, &held, &before_);
+  if (signalState.heldSteps++ > 0 || !signalState.isEnding) return;
+  // Another thread ends the run, or has just handed that on to this one: no further step begins.
+  --signalState.heldSteps;
+  ::sigprocmask(SIG_SETMASK, &before_, nullptr);
+  for (;;) ::pause();
+}
+
+EndingSignalsHeld::~EndingSignalsHeld() {
+  --signalState.heldSteps;
+  ::sigprocmask(SIG_SETMASK, &before_, nullptr);
 }
 
 }  // namespace mirevo

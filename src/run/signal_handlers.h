@@ -1,13 +1,28 @@
 #pragma once
 
+#include <csignal>
 #include <string_view>
 
 namespace mirevo {
 
 /// Installs the handlers that turn a crash or an interrupt into a logged end without processes left behind. Reads
-/// BUILDMODE and G48 as they stand now. A hang-up ends the run like a termination request, unless it is ignored already
-/// (nohup).
+/// BUILDMODE and G48 as they stand now. A hang-up, a quit key and a spent processor time end the run like a termination
+/// request, the first two unless they are ignored already (nohup, a script's background); a bus error is an illegal
+/// storage access.
 void installSignalHandlers();
+
+/// While one exists the requests to end the run wait, so that no file is left in the middle of a step. For the main
+/// thread; they may be nested.
+class EndingSignalsHeld final {
+ public:
+  EndingSignalsHeld();
+  ~EndingSignalsHeld();
+  EndingSignalsHeld(const EndingSignalsHeld&) = delete;
+  EndingSignalsHeld& operator=(const EndingSignalsHeld&) = delete;
+
+ private:
+  sigset_t before_;
+};
 
 /// Sub-codes of a floating-point signal.
 namespace fpe {

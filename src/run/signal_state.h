@@ -9,6 +9,10 @@ namespace mirevo {
 struct SignalState {
   std::atomic<int> terminationLogUnit{0};  ///< a descriptor; nothing is written there while it is 0 or less
   std::atomic<int> runLogDescriptor{-1};
+  std::atomic<int> resultFileDescriptor{-1};   ///< while it takes rows; not yet at its closing lines
+  std::atomic<int> messageFileDescriptor{-1};  ///< of the progress records
+  std::atomic<int> heldSteps{0};               ///< EndingSignalsHeld that exist
+  std::atomic<bool> isEnding{false};           ///< a request to end the run was taken
   /// Ends the model's processes, with async-signal-safe calls alone.
   std::atomic<void (*)()> haltProcesses{nullptr};
   std::atomic<bool> showsMessageBox{true};        ///< BUILDMODE is not "NIGHT"
@@ -19,7 +23,8 @@ static_assert(std::atomic<int>::is_always_lock_free && std::atomic<void (*)()>::
 
 inline SignalState signalState;
 
-/// Writes `text` and a line end with write(2). Async-signal-safe; a failure is ignored.
-void writeLineFromSignal(int descriptor, std::string_view text) noexcept;
+/// Writes `prefix`, `text` and a line end with one write(2), of 512 bytes at most. Async-signal-safe; a failure is
+/// ignored.
+void writeLineFromSignal(int descriptor, std::string_view text, std::string_view prefix = {}) noexcept;
 
 }  // namespace mirevo

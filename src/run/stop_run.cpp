@@ -1,6 +1,14 @@
 #include "run/stop_run.h"
 
+#include <cerrno>
+#include <cstring>
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <fmt/format.h>
+
 #include "platform/front_end.h"
+#include "run/signal_handlers.h"
 #include "run/signal_state.h"
 
 namespace mirevo {
@@ -9,7 +17,18 @@ void setTerminationLogUnit(int unit) {
   signalState.terminationLogUnit = unit;
 }
 
+std::string openTerminationLog(const std::string& path) {
+  if (signalState.terminationLogUnit > 0) return {};
+  // Removed rather than emptied: an earlier run that is just ending writes its last line into what it has made.
+  ::unlink(path.c_str());
+  const int unit = ::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_APPEND | O_CLOEXEC, 0666);
+  if (unit < 0) return fmt::format("Unable to open termination log: {}: {}", path, std::strerror(errno));
+  setTerminationLogUnit(unit);
+  return {};
+}
+
 void stopRun(int exitCode) {
+  const EndingSignalsHeld held;  // to the end of the process: what is said here is the last word
   if (const int unit = signalState.terminationLogUnit; unit > 0) {
     writeLineFromSignal(unit, exitCode != 0 ? "Abnormal completion" : "Successful completion");
   }

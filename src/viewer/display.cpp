@@ -50,6 +50,11 @@ class ScreenDisplay final : public Display {
     redraw();
   }
 
+  void resume() override {
+    if (hasKeyboard()) screen_.enter();
+    redraw();
+  }
+
   void redraw() override { shown_.clear(); }
 
   void close(const ProgressState& state, const ViewerSituation& situation) override {
@@ -78,6 +83,9 @@ class LineDisplay final : public Display {
   bool show(const ProgressState& state, const ViewerSituation& situation,
             const std::vector<std::string>& newMessages) override {
     std::string text;
+    const bool isAwaited = situation.presence == RunPresence::awaited && !situation.wasStarted;
+    if (isAwaited && !wasAwaited_) text.append(kNoRunYet).append("\n");
+    wasAwaited_ = isAwaited;
     for (const std::string& message : newMessages) text.append(printable(message, characters_)).append("\n");
     const bool isDue = situation.now - progressShownAt_ >= kProgressLineSeconds && state.done != evaluationsShown_;
     if (!state.countLabel.empty() && isDue) {
@@ -93,6 +101,7 @@ class LineDisplay final : public Display {
   }
 
   void suspend() override {}
+  void resume() override {}
   void redraw() override {}
 
   void close(const ProgressState& state, const ViewerSituation& situation) override {
@@ -107,6 +116,7 @@ class LineDisplay final : public Display {
   CharacterSet characters_ = wantsUtf8() ? CharacterSet::utf8 : CharacterSet::ascii;
   double progressShownAt_ = 0.0;
   std::int64_t evaluationsShown_ = 0;
+  bool wasAwaited_ = false;
   bool asked_ = false;
   std::string problemShown_;
 };

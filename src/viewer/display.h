@@ -23,6 +23,8 @@ class Display {
                     const std::vector<std::string>& newMessages) = 0;
   /// Stops this process as the terminal's user wants it, until he continues it.
   virtual void suspend() = 0;
+  /// Takes the terminal anew, after this process was stopped and the shell had it meanwhile.
+  virtual void resume() = 0;
   /// Draws everything again at the next show(), whatever has become of the screen.
   virtual void redraw() = 0;
   /// Gives the terminal back, and leaves there how things stand.

@@ -12,15 +12,27 @@
 #include <fmt/format.h>
 
 #include "platform/front_end.h"
+#include "platform/terminal.h"
 #include "viewer/run_process.h"
 #include "viewer/viewer.h"
 
 namespace mirevo {
 namespace {
 
+/// Forgets what came while the signal was blocked.
+void dropPending(int signalNumber) {
+  struct sigaction before {};
+  ::sigaction(signalNumber, nullptr, &before);
+  ::signal(signalNumber, SIG_IGN);
+  ::sigaction(signalNumber, &before, nullptr);
+}
+
 /// The run's side: away from the terminal, what it prints into the pipe, its records into the message file.
-void becomeRun(int output) {
+void becomeRun(int output, const sigset_t& blockedBefore) {
   ::setsid();
+  // What the terminal sent to both while they were one is the viewer's.
+  for (const int signalNumber : {SIGINT, SIGQUIT, SIGHUP}) dropPending(signalNumber);
+  ::sigprocmask(SIG_SETMASK, &blockedBefore, nullptr);
   ::signal(SIGPIPE, SIG_IGN);
   if (const int nothing = ::open("/dev/null", O_RDONLY | O_CLOEXEC); nothing >= 0) {
     ::dup2(nothing, STDIN_FILENO);
@@ -35,13 +47,20 @@ void becomeRun(int output) {
 
 int qmonStart(const std::string& setupFile, const std::function<void()>& run) {
   std::array<int, 2> pipe{-1, -1};
+  // Whoever started the program may have it ignored, and the run's end would never be told.
+  ::signal(SIGCHLD, SIG_DFL);
+  // A signal of the first moment waits for the viewer, which passes it on: it must not end the viewer alone.
+  const sigset_t blockedBefore = SignalQueue::block();
   const pid_t process = ::pipe2(pipe.data(), O_CLOEXEC | O_NONBLOCK) == 0 ? ::fork() : -1;
   if (process > 0) {
     ::close(pipe[1]);
     return Viewer(setupFile, std::make_unique<RunProcess>(process, pipe[0])).watch();
   }
-  if (process < 0) showMessage(fmt::format("Unable to start the progress viewer: {}", std::strerror(errno)));
-  if (process == 0) becomeRun(pipe[1]);
+  if (process < 0) {
+    showMessage(fmt::format("Unable to start the progress viewer: {}", std::strerror(errno)), {}, MessageType::warning);
+    ::sigprocmask(SIG_SETMASK, &blockedBefore, nullptr);
+  }
+  if (process == 0) becomeRun(pipe[1], blockedBefore);
   for (const int end : pipe) {
     if (end >= 0) ::close(end);
   }

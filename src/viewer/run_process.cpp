@@ -8,6 +8,12 @@
 
 namespace mirevo {
 
+namespace {
+
+constexpr int kUnknownExitCode = 1;
+
+}  // namespace
+
 RunProcess::~RunProcess() {
   if (output_ >= 0) ::close(output_);
 }
@@ -31,9 +37,13 @@ std::string RunProcess::takeOutput() {
 }
 
 std::optional<int> RunProcess::exitCode() {
+  if (exitCode_) return exitCode_;
   int status = 0;
-  if (!exitCode_ && ::waitpid(process_, &status, WNOHANG) == process_) {
+  const pid_t ended = ::waitpid(process_, &status, WNOHANG);
+  if (ended == process_) {
     exitCode_ = WIFSIGNALED(status) ? 128 + WTERMSIG(status) : WEXITSTATUS(status);
+  } else if (ended < 0 && errno == ECHILD) {
+    exitCode_ = kUnknownExitCode;  // it has ended, and somebody else was told how
   }
   return exitCode_;
 }

@@ -23,7 +23,7 @@ class RunProcess final {
 
   /// What it has printed since the last time. The pipe's end is not waited for.
   std::string takeOutput();
-  /// Its exit code once it has ended, 128 and the signal's number when a signal ended it.
+  /// Its exit code once it has ended, 128 and the signal's number when a signal ended it, 1 when nobody can tell.
   std::optional<int> exitCode();
   void send(int signal);
 

@@ -26,13 +26,15 @@ struct Fact {
   std::string value;
 };
 
-std::string evaluationsText(const ProgressState& state) {
+/// "4 of 40, 1 failed", or with what it is that is counted: "4 of 40 evaluations, 1 failed".
+std::string evaluationsText(const ProgressState& state, bool withNoun = false) {
   if (state.countLabel.empty()) return "none yet";
   std::string text = fmt::format("{}", state.done);
-  // A search runs its best set once more in the end.
+  // A search that works in loops ends the one in which it has done what was planned.
   const bool isBeyondPlan = state.planned && state.done > *state.planned;
-  if (isBeyondPlan) text += fmt::format(" ({} planned)", *state.planned);
   if (state.planned && !isBeyondPlan) text += fmt::format(" of {}", *state.planned);
+  if (withNoun) text += text == "1" || text == "1 of 1" ? " evaluation" : " evaluations";
+  if (isBeyondPlan) text += fmt::format(" ({} planned)", *state.planned);
   if (state.failed > 0) text += fmt::format(", {} failed", state.failed);
   return text;
 }
@@ -72,7 +74,7 @@ std::vector<Fact> factsOf(const ProgressState& state, const ViewerSituation& sit
 std::string presenceText(const ProgressState& state, const ViewerSituation& situation) {
   switch (situation.presence) {
     case RunPresence::awaited:
-      return "waiting";
+      return situation.wasStarted ? "starting" : "waiting";
     case RunPresence::vanished:
       return "gone";
     case RunPresence::ended:
@@ -100,7 +102,7 @@ ScreenLine lastLine(const ViewerSituation& situation, int width) {
             LineStyle::alarm};
   }
   if (!situation.problem.empty()) return {situation.problem, LineStyle::alarm};
-  if (situation.presence != RunPresence::running) return {"d leave", LineStyle::keys};
+  if (!situation.canBeCancelled()) return {"d leave", LineStyle::keys};
   if (situation.cancelRequested) {
     return {firstThatFits({"Cancelling: the run ends its model runs and closes its files.   d leave",
                            "Cancelling ...   d leave", "d leave"},
@@ -216,6 +218,7 @@ void addMessages(Screen& screen, const ProgressState& state) {
 std::string outcomeText(const ProgressState& state, const ViewerSituation& situation) {
   if (situation.presence == RunPresence::ended) return state.ending;
   if (situation.presence != RunPresence::vanished) return {};
+  if (situation.exitCode) return fmt::format("The run ended with exit code {}", *situation.exitCode);
   return fmt::format("The run is gone without saying how it ended; process {} was its own", state.process);
 }
 
@@ -227,7 +230,8 @@ std::vector<ScreenLine> layoutScreen(const ProgressState& state, const ViewerSit
   addHeading(screen, state, situation);
   if (situation.presence == RunPresence::awaited) {
     screen.addGap();
-    screen.add(situation.wasStarted ? "The run is starting." : "No run of this setup so far; waiting for one.");
+    screen.add(situation.wasStarted ? "The run is starting." : kNoRunYet);
+    if (!situation.runsLastWords.empty()) screen.add(situation.runsLastWords, LineStyle::alarm);
     return screen.finish(lastLine(situation, size.columns));
   }
   screen.addGap();
@@ -248,7 +252,7 @@ std::vector<ScreenLine> layoutScreen(const ProgressState& state, const ViewerSit
 }
 
 std::string progressLine(const ProgressState& state, const ViewerSituation& situation) {
-  std::string line = evaluationsText(state) + " evaluations";
+  std::string line = evaluationsText(state, true);
   if (const auto percent = percentReached(state)) line += fmt::format(", {:.1f} %", *percent);
   if (state.best) line += ", best so far " + bestText(state, situation.now, false);
   if (state.perSecond) line += ", " + speedText(*state.perSecond);

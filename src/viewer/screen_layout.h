@@ -1,5 +1,6 @@
 #pragma once
 
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -10,7 +11,7 @@ namespace mirevo {
 
 /// How it stands with the run that a viewer looks at.
 enum class RunPresence {
-  awaited,  ///< there is no message file yet
+  awaited,  ///< there is no message file of it yet
   running,
   vanished,  ///< its process is gone, and it has not said how it ended
   ended
@@ -24,7 +25,14 @@ struct ViewerSituation {
   bool asksToCancel = false;     ///< the question is on the screen
   bool cancelRequested = false;  ///< the kill file was made
   std::string problem;           ///< why it could not be made
+  std::string runsLastWords;     ///< the latest line that a started run has printed
+  std::optional<int> exitCode;   ///< of a started run that has ended
   double now = 0.0;              ///< seconds since 1970
+
+  /// A started run can be cancelled from its first moment on, another one once it is there.
+  bool canBeCancelled() const {
+    return presence == RunPresence::running || (presence == RunPresence::awaited && wasStarted);
+  }
 };
 
 struct ScreenSize {
@@ -49,6 +57,9 @@ std::string progressLine(const ProgressState& state, const ViewerSituation& situ
 
 /// How the run ended, or that it is gone; empty while it is neither.
 std::string outcomeText(const ProgressState& state, const ViewerSituation& situation);
+
+/// Of a setup that has no message file yet.
+inline constexpr std::string_view kNoRunYet = "No run of this setup so far; waiting for one.";
 
 /// The question before a run is cancelled.
 inline constexpr std::string_view kCancelQuestion =

@@ -79,11 +79,12 @@ bool Viewer::showNews() {
   return isSeen;
 }
 
-/// A run that came with its viewer is over with its process; of another one's end a screen stays until its user leaves.
+/// A run that came with its viewer is over with its process; of another one's end a screen stays until its user leaves,
+/// where there is one.
 bool Viewer::isOver() const {
   if (hasMore_) return false;
   const bool hasEnded = situation_.presence == RunPresence::ended || situation_.presence == RunPresence::vanished;
-  return hasEnded && (started_ || !display_->isScreen());
+  return hasEnded && (started_ || !display_->isScreen() || isUnattended());
 }
 
 void Viewer::readNews() {
@@ -109,8 +110,13 @@ void Viewer::readNews() {
 
 void Viewer::readRunOutput() {
   if (!started_) return;
-  runOutput_ += started_->takeOutput();
+  situation_.exitCode = started_->exitCode();
+  const std::string news = started_->takeOutput();
+  if (news.empty()) return;
+  runOutput_ += news;
   if (runOutput_.size() > kKeptOutput) runOutput_.erase(0, runOutput_.size() - kKeptOutput);
+  const std::vector<std::string_view> lines = splitLines(runOutput_);
+  situation_.runsLastWords = lines.empty() ? std::string_view{} : lines.back();
 }
 
 void Viewer::judgePresence(bool processIsGone) {
@@ -123,7 +129,7 @@ void Viewer::judgePresence(bool processIsGone) {
   } else {
     presence = known.ending.empty() || started_ ? RunPresence::running : RunPresence::ended;
   }
-  if (presence == RunPresence::running) return;
+  if (situation_.canBeCancelled()) return;
   situation_.asksToCancel = false;
   situation_.cancelRequested = false;
 }
@@ -139,7 +145,8 @@ void Viewer::waitForNews(bool hasMore) const {
 void Viewer::takeSignals() {
   while (const int signal = signals_.next()) {
     if (signal == SIGHUP) leaves_ = true;
-    if (signal == SIGWINCH || signal == SIGCONT) display_->redraw();
+    if (signal == SIGWINCH) display_->redraw();
+    if (signal == SIGCONT) display_->resume();
     if (signal == SIGINT && started_ && !display_->isScreen() && !hasKeyboard()) {
       started_->send(SIGINT);  // nobody can be asked
     } else if (signal == SIGINT) {
@@ -190,15 +197,21 @@ void Viewer::takeKey(char key) {
 
 /// With nothing to cancel it is the key to leave.
 void Viewer::takeCancelKey() {
-  if (situation_.presence == RunPresence::running) {
+  if (situation_.canBeCancelled()) {
     situation_.asksToCancel = !situation_.cancelRequested;
-  } else if (situation_.presence != RunPresence::awaited || !started_) {
+  } else {
     leaves_ = true;
   }
 }
 
 void Viewer::cancelRun() {
-  if (situation_.presence != RunPresence::running) return;
+  if (situation_.presence == RunPresence::awaited) {
+    // Before it has begun, a kill file would not be its own: it would cancel another run of the setup that it waits
+    // for.
+    if (started_) started_->send(SIGTERM);
+    situation_.cancelRequested = true;
+    return;
+  }
   const std::string killFile = baseName_ + "._kill_";
   const int descriptor = ::open(killFile.c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0666);
   if (descriptor < 0) {
@@ -206,6 +219,7 @@ void Viewer::cancelRun() {
     return;
   }
   ::close(descriptor);
+  situation_.problem.clear();
   situation_.cancelRequested = true;
 }
 

@@ -185,7 +185,7 @@ TEST(Scenarios, ASetOfWrongLengthOrOutOfBoundsIsRefusedByItsName) {
     const ModelFolder folder;
     const ProgramResult run = runProgram({folder.writeSetup({.option = 0, .scenarios = {"1, 2, 1", c.values}})});
     EXPECT_EQ(run.exitCode, 1) << c.values;
-    EXPECT_THAT(run.error, StartsWith(c.message));
+    EXPECT_THAT(run.error, StartsWith(std::string("Mirevo: ") + c.message));
     EXPECT_THAT(run.error, HasSubstr("basin.kdx:"));
     EXPECT_FALSE(folder.exists("basin.dat"));
   }

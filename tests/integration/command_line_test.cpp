@@ -14,7 +14,7 @@ TEST(CommandLine, WithoutASetupFileTheUsageIsShown) {
        {std::vector<std::string>{}, {"//qmon"}, {"//QMON", "//other"}, {""}, {"a.kdx", " "}}) {
     const ProgramResult result = runProgram(arguments);
     EXPECT_EQ(result.exitCode, 1);
-    EXPECT_EQ(result.error, "Usage: Mirevo kdx-file\n");
+    EXPECT_EQ(result.error, "Mirevo: Usage: Mirevo kdx-file\n");
     EXPECT_EQ(result.output, "");
   }
 }
@@ -30,14 +30,20 @@ TEST(CommandLine, AMissingSetupFileIsNamedOnStandardErrorAndInTheLog) {
   const TemporaryFolder folder;
   const ProgramResult result = runProgram({"ignored.kdx", (folder / "basin.kdx")});
   EXPECT_EQ(result.exitCode, 1);
-  EXPECT_THAT(result.error, StartsWith("Error: Unable to open " + (folder / "basin.kdx")));
+  EXPECT_THAT(result.error, StartsWith("Mirevo: Error: Unable to open " + (folder / "basin.kdx")));
   EXPECT_THAT(folder.read("basin.log"), HasSubstr("\n\nError: Unable to open " + (folder / "basin.kdx")));
   EXPECT_THAT(folder.read("basin.log"), HasSubstr("No such file or directory"));
   EXPECT_FALSE(folder.exists("basin.dat"));
 
+  // Nothing is made beside what is no file, as under /dev.
   ASSERT_EQ(::mkfifo((folder / "pipe").c_str(), 0600), 0);
-  EXPECT_EQ(runProgram({(folder / "pipe")}).error,
-            "Error: Unable to open " + (folder / "pipe") + "\nNot a regular file\n");
+  std::filesystem::create_directory((folder / "sub"));
+  for (const auto& [name, reason] : {std::pair{"pipe", "Not a regular file"}, {"sub", "Is a directory"}}) {
+    EXPECT_EQ(runProgram({(folder / name)}).error,
+              "Mirevo: Error: Unable to open " + (folder / name) + "\n" + reason + "\n");
+    for (const char* ending : {".log", "._spi_", "_Termination.log"})
+      EXPECT_FALSE(folder.exists(name + std::string(ending)));
+  }
 
   const ProgramResult nowhere = runProgram({(folder / "no/such/folder/basin.kdx")});
   EXPECT_EQ(nowhere.exitCode, 1);

@@ -60,7 +60,8 @@ TEST_F(Interruption, AKillFileEndsTheRunWithinThreeSecondsAndNothingIsLeft) {
   const ProgramResult result = program.wait(3.0);  // models that ignore SIGTERM have 2 seconds of grace
   EXPECT_FALSE(result.timedOut);
   EXPECT_EQ(result.exitCode, 1);
-  EXPECT_EQ(result.error, "Simulation cancelled\n");
+  EXPECT_EQ(result.error, "Mirevo: Simulation cancelled\n");
+  EXPECT_EQ(folder_.read("basin_Termination.log"), "Abnormal completion\n");
   EXPECT_THAT(folder_.read("basin.log"), HasSubstr("Simulation cancelled"));
   EXPECT_THAT(folder_.read("basin.log"), Not(HasSubstr("Normal termination")));
   EXPECT_THAT(folder_.read("basin.dat"), HasSubstr("# Simulation cancelled\n"));
@@ -80,8 +81,11 @@ TEST_F(Interruption, ASignalEndsTheRunWithItsMessageAndNothingIsLeft) {
     const ProgramResult result = program.wait(5.0);
     EXPECT_FALSE(result.timedOut);
     EXPECT_EQ(result.exitCode, 128 + signal);
-    EXPECT_EQ(result.error, std::string(message) + "\n");
-    EXPECT_THAT(folder_.read("basin.log"), EndsWith(std::string(message) + "\n"));
+    EXPECT_EQ(result.error, fmt::format("Mirevo: {}\n", message));
+    EXPECT_THAT(folder_.read("basin.log"), EndsWith(fmt::format("\n{}\n", message)));
+    EXPECT_THAT(folder_.read("basin.dat"), EndsWith(fmt::format("\n# {}\n", message)));
+    EXPECT_THAT(folder_.read("basin._spi_"), EndsWith(fmt::format("\nSTATUSEnded: {}\nPROGRE100.0\n", message)));
+    EXPECT_EQ(folder_.read("basin_Termination.log"), fmt::format("{}\nAbnormal completion\n", message));
     expectFirstRowIsThere();
     expectGone(grandchild);
     std::filesystem::remove_all((folder_ / "basin_Process1"));
@@ -100,6 +104,7 @@ TEST_F(Interruption, AKilledRunLeavesNoModelBehind) {
 TEST_F(Interruption, ASetupThatIsBeingRunIsNotRunASecondTime) {
   RunningProgram program({setup_});
   waitForGrandchild();
+  ASSERT_TRUE(waitUntil([&] { return folder_.read("basin.log").ends_with("No. 2 initiated\n"); }));
   const std::string log = folder_.read("basin.log");
   const ProgramResult second = runProgram({setup_});
   EXPECT_EQ(second.exitCode, 1);

@@ -48,6 +48,8 @@ TEST(Optimisation, ACalibrationEndsWithItsBestSetInLogResultsAndModelFolder) {
   EXPECT_THAT(log, HasSubstr("   a = " + table.rows.back()[2] + "\n"));
   EXPECT_THAT(log, EndsWith("\n\nNormal termination\n"));
   EXPECT_THAT(folder.read("basin._spi_"), EndsWith("PROGRE100.0\n"));
+  EXPECT_THAT(folder.read("basin._spi_"), HasSubstr("\nMESLBL of 201\n"));
+  EXPECT_EQ(folder.read("basin_Termination.log"), "Successful completion\n");
   EXPECT_FALSE(folder.exists("calSimErr.dat"));
   EXPECT_NEAR(number(folder.read("basin_Process1/parameters.txt").substr(4)), number(table.rows.back()[2]), 1e-6);
 }
@@ -216,9 +218,9 @@ TEST(Refusals, WhatIsMissingIsNamedBeforeAnyModelRun) {
     const ModelFolder folder;
     const ProgramResult result = runProgram({folder.writeSetup(c.settings)});
     EXPECT_EQ(result.exitCode, 1);
-    EXPECT_THAT(result.error, StartsWith("Error"));
+    EXPECT_THAT(result.error, StartsWith("Mirevo: Error"));
     EXPECT_THAT(result.error, HasSubstr(c.message));
-    EXPECT_THAT(folder.read("basin.log"), EndsWith("\n\n" + result.error));
+    EXPECT_THAT(folder.read("basin.log"), EndsWith("\n\n" + result.error.substr(std::size("Mirevo: ") - 1)));
     EXPECT_FALSE(folder.exists("basin_Optimisation.dat"));
   }
 }

@@ -124,7 +124,7 @@ TEST_F(ViewerTest, ARunOutlivesItsViewerUntouched) {
         Case{"crash", [](TerminalProgram& viewer) { ::kill(viewer.process(), SIGKILL); }, false}}) {
     SCOPED_TRACE(example.name);
     TerminalProgram viewer({MIREVO_PROGRAM, "//qmon", folder_.writeSetup(slowRun())});
-    ASSERT_TRUE(viewer.shows("of 200"));
+    ASSERT_TRUE(viewer.shows("of 201"));
     const int process = runsProcess();
     example.part(viewer);
     EXPECT_EQ(viewer.wait(), std::string(example.name) == "crash" ? 128 + SIGKILL : 0);
@@ -145,12 +145,35 @@ TEST_F(ViewerTest, ARunOutlivesItsViewerUntouched) {
 
 TEST_F(ViewerTest, ControlCAsksUnderTheViewerAndYesCancels) {
   TerminalProgram viewer({MIREVO_PROGRAM, "//qmon", folder_.writeSetup(slowRun())});
-  ASSERT_TRUE(viewer.shows("of 200"));
+  ASSERT_TRUE(viewer.shows("of 201"));
   viewer.type("\x03");
   ASSERT_TRUE(viewer.shows("Cancel the run?"));
   viewer.type("y");
   EXPECT_EQ(viewer.wait(), 1);
   EXPECT_THAT(viewer.output(), HasSubstr("Simulation cancelled"));
+}
+
+/// A run whose lock is held by another one of the setup is starting for some seconds.
+TEST_F(ViewerTest, CancellingARunThatIsOnlyStartingLeavesAnotherRunAlone) {
+  const std::string setup = folder_.writeSetup(slowRun());
+  RunningProgram other({setup});
+  ASSERT_TRUE(reaches("basin._spi_", "COMSPD"));
+  TerminalProgram viewer({MIREVO_PROGRAM, "//qmon", setup});
+  ASSERT_TRUE(viewer.shows("The run is starting."));
+  viewer.type("q");
+  ASSERT_TRUE(viewer.shows("Cancel the run?"));
+  viewer.type("y");
+  EXPECT_EQ(viewer.wait(), 128 + SIGTERM);
+  EXPECT_THAT(viewer.output(), HasSubstr("Mirevo: Termination request"));
+  EXPECT_FALSE(folder_.exists("basin._kill_"));
+  EXPECT_THAT(folder_.read("basin._spi_"), Not(HasSubstr("Ended")));
+}
+
+TEST_F(ViewerTest, NoPersonIsWaitedForAtNight) {
+  folder_.write("basin.kdx", "");
+  folder_.write("basin._spi_", runningRun() + "STATUSEnded: Normal termination\nPROGRE100.0\n");
+  TerminalProgram viewer(attached(), {{"BUILDMODE", "NIGHT"}});
+  EXPECT_EQ(viewer.wait(), 0);
 }
 
 TEST_F(ViewerTest, ARunThatWasKilledIsFoundGone) {
@@ -176,6 +199,11 @@ TEST_F(ViewerTest, WithoutATerminalTheMessagesComeAsLines) {
   EXPECT_EQ(dumb.wait(), 0);
   EXPECT_THAT(dumb.output(), HasSubstr("-- Normal termination"));
   EXPECT_THAT(dumb.output(), Not(HasSubstr("\x1b")));
+
+  std::filesystem::remove((folder_ / "basin._spi_"));
+  // As under a program that wants to hear nothing of its children.
+  RunningProgram unheard({"--ignore-signal=CHLD", MIREVO_PROGRAM, "//qmon", (folder_ / "basin.kdx")}, {}, "env");
+  EXPECT_EQ(unheard.wait().exitCode, 0);
 
   std::filesystem::remove((folder_ / "basin._spi_"));
   RunningProgram interrupted({"//qmon", folder_.writeSetup(slowRun())});

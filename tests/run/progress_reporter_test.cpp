@@ -1,5 +1,12 @@
 #include "run/progress_reporter.h"
 
+#include <algorithm>
+#include <array>
+#include <csignal>
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
 #include <gtest/gtest.h>
 
 #include "temporary_folder.h"
@@ -88,6 +95,33 @@ TEST_F(ProgressReporterTest, AMessageFileThatCannotBeOpenedIsReportedAndTheRunGo
   reporter_.progressStart("2026-11-21 04:10:09 +0100 on host, process 7");
   reporter_.progressStep();
   EXPECT_FALSE(reporter_.isCancelled());
+}
+
+TEST_F(ProgressReporterTest, AReaderThatStopsReadingLosesRecordsAndHoldsUpNothing) {
+  const std::string pipe = (folder_ / "basin._spi_");
+  ASSERT_EQ(::mkfifo(pipe.c_str(), 0600), 0);
+  EXPECT_NE(init(reporter_), "");  // nobody reads it
+  const int reader = ::open(pipe.c_str(), O_RDONLY | O_NONBLOCK);
+  EXPECT_EQ(init(reporter_), "");
+  const std::string text(200, 'x');
+  for (int i = 0; i < 1000; ++i) reporter_.writeMessage(text);  // more than a pipe holds
+  std::string records;
+  const auto readAll = [&] {
+    std::array<char, 4096> piece{};
+    for (ssize_t count = 1; count > 0;) {
+      count = ::read(reader, piece.data(), piece.size());
+      if (count > 0) records.append(piece.data(), static_cast<std::size_t>(count));
+    }
+  };
+  readAll();
+  reporter_.writeMessage("taken again");
+  readAll();
+  EXPECT_LT(std::count(records.begin(), records.end(), '\n'), 1000);
+  EXPECT_TRUE(records.ends_with("xxx\nMESSAGtaken again\n"));
+  EXPECT_EQ(records.find("xMESSAG"), std::string::npos);
+  ::signal(SIGPIPE, SIG_IGN);
+  ::close(reader);
+  reporter_.writeMessage("nobody reads it any more");
 }
 
 TEST_F(ProgressReporterTest, TheBaseNameLosesOnlyAKnownEnding) {

@@ -38,7 +38,7 @@ TEST_F(SetupSummaryTest, SaysWhatTheRunIsAboutToDo) {
       "  Flow: sum of squares of 1 output measures, weight 0.75, standard deviation 2.5\n"
       "Aggregation: No transformation\n"
       "Random seed: -77\n"
-      "Model evaluations planned: 500\n"
+      "Model evaluations planned: 500 and a final model run\n"
       "Simultaneous simulations: 4");
 }
 

@@ -6,6 +6,7 @@
 #include <fcntl.h>
 #include <fenv.h>
 #include <signal.h>
+#include <thread>
 #include <unistd.h>
 
 #include <fmt/format.h>
@@ -29,6 +30,8 @@ void actWithHandlers(const TemporaryFolder& folder, const char* buildMode, const
   ::setenv("G48", frontEnd, 1);
   ::dup2(open("stdout"), STDOUT_FILENO);
   signalState.runLogDescriptor = open("run.log");
+  signalState.resultFileDescriptor = open("results");
+  signalState.messageFileDescriptor = open("records");
   setTerminationLogUnit(open("termination.log"));
   installSignalHandlers();
   act();
@@ -38,15 +41,19 @@ void actWithHandlers(const TemporaryFolder& folder, const char* buildMode, const
 const struct {
   int signal;
   const char* message;
-} kSignals[] = {{SIGABRT, "Abnormal termination"},   {SIGILL, "Illegal instruction"},  {SIGINT, "Control-C send"},
-                {SIGSEGV, "Illegal storage access"}, {SIGTERM, "Termination request"}, {SIGHUP, "Termination request"}};
+} kSignals[] = {
+    {SIGABRT, "Abnormal termination"},   {SIGILL, "Illegal instruction"},  {SIGINT, "Control-C send"},
+    {SIGSEGV, "Illegal storage access"}, {SIGTERM, "Termination request"}, {SIGHUP, "Termination request"},
+    {SIGBUS, "Illegal storage access"},  {SIGQUIT, "Termination request"}, {SIGXCPU, "Termination request"}};
 
 TEST(SignalHandlers, EverySignalEndsTheRunWithItsMessageInEveryPlace) {
   for (const auto& [signal, message] : kSignals) {
     const TemporaryFolder folder;
     EXPECT_EXIT(actWithHandlers(folder, "", "WIN", [signal = signal] { ::raise(signal); }),
-                ::testing::ExitedWithCode(128 + signal), message);
+                ::testing::ExitedWithCode(128 + signal), fmt::format("^run_tests: {}\n$", message));
     EXPECT_EQ(folder.read("run.log"), fmt::format("\n{}\n", message));
+    EXPECT_EQ(folder.read("results"), fmt::format("# {}\n", message));
+    EXPECT_EQ(folder.read("records"), fmt::format("STATUSEnded: {}\nPROGRE100.0\n", message));
     EXPECT_EQ(folder.read("termination.log"), std::string(message) + "\nAbnormal completion\n");
   }
 }
@@ -69,6 +76,22 @@ TEST(SignalHandlers, TheReasonIsLoggedBeforeTheModelIsHalted) {
   };
   EXPECT_EXIT(actWithHandlers(folder, "", "WIN", haltWhileSayingSo), ::testing::ExitedWithCode(130), "");
   EXPECT_EQ(folder.read("run.log"), "\nControl-C send\nhalted\n");
+}
+
+/// A library's thread must not take it either, as the kernel lets one do where the main thread does not.
+TEST(SignalHandlers, ARequestWaitsForTheEndOfAStepOfTheMainThread) {
+  const TemporaryFolder folder;
+  const auto askInTheMiddle = [] {
+    std::thread other([] { ::pause(); });
+    {
+      const EndingSignalsHeld held;
+      ::kill(::getpid(), SIGTERM);
+      writeLineFromSignal(signalState.resultFileDescriptor, "whole record");
+    }
+    other.join();
+  };
+  EXPECT_EXIT(actWithHandlers(folder, "", "WIN", askInTheMiddle), ::testing::ExitedWithCode(143), "");
+  EXPECT_EQ(folder.read("results"), "whole record\n# Termination request\n");
 }
 
 TEST(SignalHandlers, FloatingPointSubCodesHaveTheirOwnMessages) {
@@ -122,6 +145,25 @@ TEST(StopRun, TheCompletionLineGoesToATerminationLogThatIsSet) {
   };
   EXPECT_EXIT(actWithHandlers(folder, "", "WIN", without), ::testing::ExitedWithCode(0), "");
   EXPECT_EQ(folder.read("termination.log"), "");
+}
+
+TEST(StopRun, ATerminationLogIsThatOfTheLatestRunAndAnEarlierOneStillWritesItsOwn) {
+  const TemporaryFolder folder;
+  const auto runTwice = [&] {
+    setTerminationLogUnit(0);
+    EXPECT_EQ(openTerminationLog(folder / "a.log"), "");
+    const int earlier = signalState.terminationLogUnit;
+    setTerminationLogUnit(0);
+    EXPECT_EQ(openTerminationLog(folder / "a.log"), "");
+    EXPECT_EQ(openTerminationLog(folder / "b.log"), "");  // one is set already
+    writeLineFromSignal(earlier, "of the earlier run");
+    stopRun(0);
+  };
+  folder.write("a.log", "of a run long ago\n");
+  EXPECT_EXIT(actWithHandlers(folder, "", "WIN", runTwice), ::testing::ExitedWithCode(0), "");
+  EXPECT_EQ(folder.read("a.log"), "Successful completion\n");
+  EXPECT_FALSE(folder.exists("b.log"));
+  EXPECT_THAT(openTerminationLog(folder / "no/such/folder/a.log"), ::testing::StartsWith("Unable to open"));
 }
 
 }  // namespace

@@ -165,7 +165,7 @@ TEST(ScreenLayout, TheLastLineAsksTellsAndOffersKeys) {
   situation.problem = "Unable to cancel: Permission denied";
   EXPECT_EQ(layoutScreen(stateOf(), situation, {80, 10}, CharacterSet::utf8).back().text, situation.problem);
   EXPECT_EQ(progressLine(stateOf(), situationOf()),
-            "4 of 40, 1 failed evaluations, 10.0 %, best so far 2 (No. 4, 1 h ago), 36 an hour, 59 min 50 s left");
+            "4 of 40 evaluations, 1 failed, 10.0 %, best so far 2 (No. 4, 1 h ago), 36 an hour, 59 min 50 s left");
 }
 
 TEST(CoursePlot, ValuesOverDecadesAreDrawnOnALogarithmicScale) {
