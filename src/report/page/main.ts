@@ -1,0 +1,2 @@
+const place = document.getElementById('report')!;
+place.textContent = document.getElementById('report-data')!.textContent;
