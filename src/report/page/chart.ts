@@ -2,7 +2,7 @@
 // one by one while the page has nothing else to do, so that a long report opens at once.
 import { BarChart, CustomChart, HeatmapChart, LineChart, ParallelChart, ScatterChart } from 'echarts/charts';
 import {
-  DataZoomComponent, GridComponent, LegendComponent, MarkAreaComponent, MarkLineComponent, ParallelComponent,
+  DatasetComponent, DataZoomComponent, GridComponent, LegendComponent, MarkAreaComponent, MarkLineComponent, ParallelComponent,
   ToolboxComponent, TooltipComponent, VisualMapComponent,
 } from 'echarts/components';
 import { init, use, type ECharts, type EChartsCoreOption } from 'echarts/core';
@@ -14,7 +14,7 @@ import { spaced } from './numbers';
 
 use([
   BarChart, CustomChart, HeatmapChart, LineChart, ParallelChart, ScatterChart,
-  DataZoomComponent, GridComponent, LegendComponent, MarkAreaComponent, MarkLineComponent, ParallelComponent,
+  DatasetComponent, DataZoomComponent, GridComponent, LegendComponent, MarkAreaComponent, MarkLineComponent, ParallelComponent,
   ToolboxComponent, TooltipComponent, VisualMapComponent, CanvasRenderer,
 ]);
 
@@ -159,6 +159,9 @@ function zooming(zoom: ChartPlan['zoom'], option: Option): Option {
   };
 }
 
+// One style for all: the library sets the larger units in bold.
+const kTimeLabels = { year: '{yyyy}', month: '{MMM} {yyyy}', day: '{d} {MMM}', hour: '{HH}:{mm}', minute: '{HH}:{mm}', second: '{HH}:{mm}:{ss}' };
+
 export interface AxisPlan {
   name?: string;
   log?: boolean;
@@ -175,13 +178,14 @@ export function axis(look: Look, plan: AxisPlan): object {
     nameLocation: 'middle',
     nameTextStyle: { color: look.muted, width: 260, overflow: 'truncate' },
     scale: true,
-    axisLine: { show: true, lineStyle: { color: look.muted } },
+    axisLine: { show: true, onZero: false, lineStyle: { color: look.muted } },
     axisTick: { show: true, lineStyle: { color: look.muted } },
     splitLine: { show: type !== 'category', lineStyle: { color: look.rule } },
     ...more,
     axisLabel: {
       color: look.muted, hideOverlap: true,
       ...(type === 'value' || type === 'log' ? { formatter: (value: number) => number(value, 5) } : {}),
+      ...(type === 'time' ? { formatter: kTimeLabels } : {}),
       ...(more.axisLabel as object | undefined),
     },
   };
@@ -190,7 +194,7 @@ export function axis(look: Look, plan: AxisPlan): object {
 export function legend(look: Look, more: object = {}): object {
   return {
     top: 0, left: 'center', type: 'scroll', itemWidth: 22, itemHeight: 10,
-    textStyle: { color: look.ink, width: 220, overflow: 'truncate' }, inactiveColor: look.rule,
+    textStyle: { color: look.ink, width: 220, overflow: 'truncate' }, inactiveColor: look.faded,
     pageTextStyle: { color: look.muted }, pageIconColor: look.ink, pageIconInactiveColor: look.rule, ...more,
   };
 }

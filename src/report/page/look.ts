@@ -3,8 +3,10 @@
 
 export interface Look {
   ink: string;
+  inkOnStrong: string; // on the ends of `diverging`
   muted: string;
   rule: string;
+  faded: string; // switched off
   surface: string;
   observed: string;
   best: string;
@@ -20,8 +22,10 @@ export interface Look {
 
 const kLight: Look = {
   ink: '#1d2733',
+  inkOnStrong: '#ffffff',
   muted: '#5b6875',
   rule: '#dfe4ea',
+  faded: '#b4bdc7',
   surface: '#ffffff',
   observed: '#1d2733',
   best: '#0072b2',
@@ -37,8 +41,10 @@ const kLight: Look = {
 
 const kDark: Look = {
   ink: '#e3e8ee',
+  inkOnStrong: '#0f151b',
   muted: '#9aa7b4',
   rule: '#323d49',
+  faded: '#566370',
   surface: '#171e26',
   observed: '#e8edf2',
   best: '#56b4e9',

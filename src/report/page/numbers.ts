@@ -66,8 +66,15 @@ export interface Bin {
   count: number;
 }
 
-/** Bins of equal width after Freedman and Diaconis (1981), 5 to 50 of them; one bin where all values are equal. */
-export function histogram(values: readonly Maybe[]): Bin[] {
+/**
+ * Bins of equal width (`log`: of equal ratio, for positive values) after Freedman and Diaconis (1981), 5 to 50 of them; one
+ * bin where all values are equal.
+ */
+export function histogram(values: readonly Maybe[], log = false): Bin[] {
+  if (log) {
+    const bins = histogram(values.map((value) => (value === null ? null : Math.log(value))));
+    return bins.map(({ from, to, count }) => ({ from: Math.exp(from), to: Math.exp(to), count }));
+  }
   const ordered = sorted(values);
   if (ordered.length === 0) return [];
   const low = ordered[0]!;
@@ -120,7 +127,9 @@ export function axisTop(values: readonly Maybe[]): number {
   if (ordered.length < 20) return Infinity;
   const low = ordered[0]!;
   const most = quantile(ordered, 0.95);
-  return ordered[ordered.length - 1]! - low > 3 * (most - low) && most > low ? most + 0.25 * (most - low) : Infinity;
+  if (!(most > low) || ordered[ordered.length - 1]! - low <= 3 * (most - low)) return Infinity;
+  const unit = 10 ** (Math.floor(Math.log10(most - low)) - 1);
+  return Number((Math.ceil((most + 0.25 * (most - low)) / (5 * unit)) * 5 * unit).toPrecision(6));
 }
 
 /** Share of the way from the lower to the upper bound, on the scale on which the parameter is searched. */

@@ -17,8 +17,8 @@ const kStates = {
   failed: { mark: '\u2715', text: 'Failed', kind: 'bad' },
 } as const;
 
-/** The name of a parameter, measure or objective in a sentence. */
-const named = (name: string) => `\u201c${shorten(name, 60)}\u201d`;
+/** The name of a parameter, measure or objective in a sentence, isolated: its writing direction stays its own. */
+const named = (name: string) => `\u2068${shorten(name, 60)}\u2069`;
 
 function improvement(data: ReportData): Finding | null {
   const { best, run, evaluations } = data;
@@ -49,12 +49,12 @@ function findings(data: ReportData): Finding[] {
     found.push({ kind: 'plain', text: `${percent(band.inside)} of the observed values of ${named(band.measure)} lie within the 5 to 95 % band.` });
   }
   if (data.sensitivity && data.sensitivity.ranking.length > 0) {
-    const first = data.sensitivity.ranking.slice(0, 3).map((name) => shorten(name, 30)).join(', ');
+    const first = data.sensitivity.ranking.slice(0, 3).map(named).join(', ');
     found.push({ kind: 'plain', text: `Most sensitive: ${first}.` });
   }
   const near = data.parameters.filter((parameter) => parameter.nearBound);
   if (near.length > 0) {
-    const names = near.slice(0, 6).map((parameter) => `${shorten(parameter.name, 30)} (${parameter.nearBound})`).join(', ');
+    const names = near.slice(0, 6).map((parameter) => `${named(parameter.name)} (${parameter.nearBound})`).join(', ');
     const rest = near.length > 6 ? ` and ${near.length - 6} more` : '';
     found.push({ kind: 'warning', text: `Best value near a bound: ${names}${rest}. A wider bound may fit better.` });
   }

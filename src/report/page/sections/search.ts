@@ -139,9 +139,10 @@ function parallelPlan(data: ReportData, good: number[]): ChartPlan {
     note: `Each line is a parameter set, the colour its aggregate; the thick line is the best. Drag along an axis to pick lines.${
       good.length > drawn.length ? ` ${count(drawn.length)} of ${count(good.length)} lines are drawn.` : ''}`,
     height: 400,
-    option: (look) => ({
+    switches: [{ key: 'fit', label: 'Fit axes', hint: 'Axes over the values of these sets instead of the bounds' }],
+    option: (look, is) => ({
       parallelAxis: [...variable.map((parameter, dim) => ({
-        dim, name: shorten(parameter.name, 18), min: parameter.lower ?? undefined, max: parameter.upper ?? undefined,
+        dim, name: shorten(parameter.name, 18), scale: true, min: is('fit') ? 'dataMin' : parameter.lower, max: is('fit') ? 'dataMax' : parameter.upper,
         type: parameter.transformation === 'logarithmic' && (parameter.lower ?? 0) > 0 ? 'log' : 'value',
       })), { dim: variable.length, name: 'Aggregate', scale: true, type: 'value' }],
       parallel: {
@@ -149,7 +150,7 @@ function parallelPlan(data: ReportData, good: number[]): ChartPlan {
         parallelAxisDefault: {
           nameLocation: 'end', nameGap: 16, nameTextStyle: { color: look.ink, fontSize: 12 },
           axisLine: { lineStyle: { color: look.muted } }, axisTick: { lineStyle: { color: look.muted } },
-          axisLabel: { color: look.muted, fontSize: 10, formatter: (value: number) => number(value, 3) },
+          axisLabel: { color: look.muted, fontSize: 10, formatter: (value: number) => number(value, 5) },
           areaSelectStyle: { color: look.band, borderColor: look.band, opacity: 0.3, width: 16 },
         },
       },

@@ -92,7 +92,7 @@ function covarianceContent(data: ReportData, covariance: Covariance): Node[] {
   return [
     heading('Confidence limits'),
     table(columns, rows, 'Confidence limits'),
-    ...(covariance.leftOut.length > 0 ? [paragraph(`Left out, as the outputs do not determine them: ${covariance.leftOut.map((name) => shorten(name, 60)).join(', ')}.`)] : []),
+    ...(covariance.leftOut.length > 0 ? [paragraph(`Left out, as the outputs do not determine them: ${covariance.leftOut.map((name) => `\u2068${shorten(name, 60)}\u2069`).join(', ')}.`)] : []),
     chart(confidencePlan(data, covariance)),
     chart(heatmap('Correlation of the estimated parameters', covariance.names, covariance.names, covariance.correlation, 1,
       'Values near \u00b11 say that the observations cannot tell two parameters apart.')),

@@ -28,9 +28,12 @@ const unitOf = (series: { measure: string; unit?: string | null }) => series.uni
 const onLog = (values: Maybe[], log: boolean) => (log ? values.map((value) => (value !== null && value > 0 ? value : null)) : values);
 const lineStyles = (look: Look) => ({
   initial: { color: look.initial, width: 1.2, type: 'dashed' as const },
-  best: { color: look.best, width: 1.6 },
-  observed: { color: look.observed, width: 1.1 },
+  best: { color: look.best, width: 2.2 },
+  observed: { color: look.observed, width: 1 },
 });
+
+/** Names that fit a small chart. */
+const short = (simulated: Simulated[]) => simulated.map((one) => ({ ...one, name: one.key }));
 
 /** Areas outside the evaluation period, where nothing is judged. */
 export function outsidePeriod(look: Look, times: number[], period: [number, number] | null | undefined): object {
@@ -52,7 +55,7 @@ function hydrographPlan(data: ReportData, series: Series): ChartPlan {
   return {
     title: 'Simulated and observed, and the residuals',
     note: `Residual: ${judged ? shorten(judged.name, 60) : 'simulated'} less observed.${series.period ? ' Shaded: outside the evaluation period.' : ''} Drag across the chart to zoom in, move the slider below to go along.`,
-    height: 520,
+    height: 492,
     zoom: 'x',
     switches: [{ key: 'log', label: 'Log' }],
     option: (look, is) => {
@@ -95,8 +98,8 @@ function hydrographPlan(data: ReportData, series: Series): ChartPlan {
           },
         }),
         series: [
-          ...simulated.map(({ key, name }) => line(name, key, style[key], { z: key === 'best' ? 4 : 2 })),
-          line('observed', 'observed', style.observed, { z: 3, ...outsidePeriod(look, times, series.period) }),
+          ...simulated.map(({ key, name }) => line(name, key, style[key], { z: key === 'best' ? 3 : 2 })),
+          line('observed', 'observed', style.observed, { z: 4, ...outsidePeriod(look, times, series.period) }),
           ...(residuals ? [line('residual', 'residual', { color: look.best }, { xAxisIndex: 1, yAxisIndex: 1, lineStyle: { color: look.best, width: 1 }, areaStyle: { color: look.best, opacity: 0.2 } })] : []),
         ],
       };
@@ -122,7 +125,7 @@ function scatterPlan(data: ReportData, series: Series): ChartPlan {
   const places = judgedPlaces(series);
   const times = timesOf(series, series.observed.length);
   const observed = places.map((place) => series.observed[place] ?? null);
-  const simulated = simulations(data, series);
+  const simulated = short(simulations(data, series));
   return {
     title: 'Simulated against observed',
     height: 340,
@@ -164,7 +167,7 @@ function scatterPlan(data: ReportData, series: Series): ChartPlan {
 function durationPlan(data: ReportData, series: Series): ChartPlan {
   const places = judgedPlaces(series);
   const curves = [
-    ...simulations(data, series),
+    ...short(simulations(data, series)),
     { key: 'observed' as const, name: 'observed', values: series.observed },
   ].map((curve) => {
     // What is compared are the same times for all: without a simulated value there is none of any.

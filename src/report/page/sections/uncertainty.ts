@@ -8,8 +8,9 @@ import { grid, heading, paragraph, type Section } from './section';
 
 const kBandPoints = 1500; // across the chart: more than it has pixels
 
-function histogramPlan(name: string, values: Maybe[]): ChartPlan {
-  const bins = histogram(values);
+function histogramPlan(name: string, values: Maybe[], wantsLog = false): ChartPlan {
+  const log = wantsLog && finite(values).every((value) => value > 0);
+  const bins = histogram(values, log);
   const bounds = (bin: Bin) => `${number(bin.from)} to ${number(bin.to)}`;
   return {
     title: name,
@@ -17,7 +18,7 @@ function histogramPlan(name: string, values: Maybe[]): ChartPlan {
     small: true,
     option: (look) => ({
       grid: { left: 16, right: 14, top: 12, bottom: 16 },
-      xAxis: axis(look, { splitNumber: 4, splitLine: { show: false }, min: bins[0]?.from, max: bins[bins.length - 1]?.to }),
+      xAxis: axis(look, { log, splitNumber: 4, splitLine: { show: false }, min: bins[0]?.from, max: bins[bins.length - 1]?.to }),
       yAxis: axis(look, { scale: false, splitNumber: 3, minInterval: 1 }),
       tooltip: tooltip(look, { formatter: (bar: { dataIndex: number }) =>
         tip(bounds(bins[bar.dataIndex]!), [['evaluations', count(bins[bar.dataIndex]!.count)]]) }),
@@ -150,7 +151,8 @@ export function bandSection(data: ReportData): Section | null {
 }
 
 export function distributionSection(data: ReportData): Section | null {
-  const inputs = variableParameters(data).map(({ name }, index) => chart(histogramPlan(name, data.evaluations.parameters[index] ?? [])));
+  const inputs = variableParameters(data).map(({ name, transformation }, index) =>
+    chart(histogramPlan(name, data.evaluations.parameters[index] ?? [], transformation === 'logarithmic')));
   const outputs = judgements(data).map(({ name, values }) => chart(histogramPlan(name, values)));
   if (data.evaluations.count < 2 || inputs.length + outputs.length === 0) return null;
   return {
