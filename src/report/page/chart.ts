@@ -59,6 +59,7 @@ class Drawn {
   private chart: ECharts | null = null;
   private readonly state = new Map<string, boolean>();
   private paperWidth: number | null = null;
+  private picture: HTMLCanvasElement | null = null;
 
   constructor(private readonly plan: ChartPlan, private readonly figure: HTMLElement, private readonly canvas: HTMLElement) {
     for (const item of plan.switches ?? []) this.state.set(item.key, item.on ?? false);
@@ -75,7 +76,7 @@ class Drawn {
   draw(): void {
     if (this.chart) return;
     coming.unobserve(this.figure);
-    this.chart = init(this.canvas, null, { height: this.plan.height, ...(this.paperWidth && { width: this.paperWidth }) });
+    this.chart = init(this.canvas, null, { height: this.plan.height });
     new ResizeObserver(() => { if (this.paperWidth === null) this.chart!.resize(); }).observe(this.canvas);
     this.canvas.addEventListener('dblclick', () => this.resetZoom());
     this.redraw();
@@ -96,12 +97,23 @@ class Drawn {
     this.chart?.dispatchAction({ type: 'dataZoom', start: 0, end: 100 });
   }
 
-  /** Prepares for a sheet `width` wide, or with null for the screen again. */
-  paper(width: number | null): void {
-    this.paperWidth = width;
+  /** Puts a picture for a sheet `width` wide in the chart's place: what printing makes of a live canvas differs too much. */
+  print(width: number): void {
     this.draw();
-    this.chart!.resize(width === null ? { width: 'auto' } : { width });
+    this.paperWidth = width;
+    this.chart!.resize({ width });
     this.chart!.getZr().flush();
+    const drawing = this.chart!.getRenderedCanvas({ pixelRatio: 2 });
+    this.picture = make('canvas', { class: 'picture', width: drawing.width, height: drawing.height, style: `width: ${width}px` });
+    this.picture.getContext('2d')!.drawImage(drawing, 0, 0);
+    this.canvas.replaceWith(this.picture);
+  }
+
+  endPrint(): void {
+    this.picture?.replaceWith(this.canvas);
+    this.picture = null;
+    this.paperWidth = null;
+    this.chart?.resize({ width: 'auto' });
   }
 
   get small(): boolean {
@@ -269,10 +281,10 @@ export function drawInTime(allDrawn: () => void): void {
   onLookChange(() => all().forEach((drawn) => drawn.redraw()));
   window.addEventListener('beforeprint', () => {
     setPrinting(true);
-    all().forEach((drawn) => drawn.paper(drawn.small ? Math.floor(kPaperWidth / 2) - 16 : kPaperWidth));
+    all().forEach((drawn) => drawn.print(drawn.small ? Math.floor(kPaperWidth / 2) - 16 : kPaperWidth));
   });
   window.addEventListener('afterprint', () => {
-    all().forEach((drawn) => drawn.paper(null));
+    all().forEach((drawn) => drawn.endPrint());
     setPrinting(false);
   });
 }
