@@ -58,7 +58,6 @@ const coming = new IntersectionObserver((entries) => {
 class Drawn {
   private chart: ECharts | null = null;
   private readonly state = new Map<string, boolean>();
-  private paperWidth: number | null = null;
   private picture: HTMLCanvasElement | null = null;
 
   constructor(private readonly plan: ChartPlan, private readonly figure: HTMLElement, private readonly canvas: HTMLElement) {
@@ -77,7 +76,11 @@ class Drawn {
     if (this.chart) return;
     coming.unobserve(this.figure);
     this.chart = init(this.canvas, null, { height: this.plan.height });
-    new ResizeObserver(() => { if (this.paperWidth === null) this.chart!.resize(); }).observe(this.canvas);
+    new ResizeObserver(() => {
+      if (this.picture) return;
+      this.chart!.resize();
+      this.chart!.getZr().flush();
+    }).observe(this.canvas);
     this.canvas.addEventListener('dblclick', () => this.resetZoom());
     this.redraw();
   }
@@ -100,7 +103,6 @@ class Drawn {
   /** Puts a picture for a sheet `width` wide in the chart's place: what printing makes of a live canvas differs too much. */
   print(width: number): void {
     this.draw();
-    this.paperWidth = width;
     this.chart!.resize({ width });
     this.chart!.getZr().flush();
     const drawing = this.chart!.getRenderedCanvas({ pixelRatio: 2 });
@@ -112,8 +114,8 @@ class Drawn {
   endPrint(): void {
     this.picture?.replaceWith(this.canvas);
     this.picture = null;
-    this.paperWidth = null;
     this.chart?.resize({ width: 'auto' });
+    this.chart?.getZr().flush();
   }
 
   get small(): boolean {

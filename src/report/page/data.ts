@@ -12,7 +12,7 @@ export interface Run {
   started: string | null; // 2026-11-21 07:00:00, local time
   ended: string | null;
   reportMade: string;
-  state: 'finished' | 'running or cut off' | 'cancelled' | 'failed';
+  state: 'finished' | 'running' | 'cut off' | 'cancelled' | 'failed';
   message: string | null; // why it stopped
   evaluations: number;
   planned: number | null;
@@ -28,6 +28,8 @@ export interface Run {
 
 export interface Parameter {
   name: string;
+  comment?: string | null;
+  equation?: string | null; // of a dependent one
   lower: Maybe;
   upper: Maybe;
   start: Maybe;
@@ -90,14 +92,25 @@ export interface Figures {
   r2: Maybe;
 }
 
+/** Values against the percentage of the time in which they are exceeded. */
+export interface FlowDuration {
+  exceedance: number[];
+  observed?: Maybe[];
+  initial?: Maybe[];
+  best?: Maybe[];
+}
+
+/** A simulated and an observed series. */
 export interface Series extends Times {
-  measure: string;
+  measure: string; // names of all measures that compare the two
   unit: string | null;
   observed: Maybe[];
   initial?: Maybe[];
   best?: Maybe[];
   bestNumber?: number | null;
   period?: [number, number] | null;
+  thinned?: boolean; // reduced to the extremes of short spans; figures and `flowDuration` are of all values
+  flowDuration?: FlowDuration;
   figures?: { initial?: Figures | null; best?: Figures | null };
 }
 

@@ -14,9 +14,9 @@ function sections(data: ReportData): Section[] {
   const { task } = data.run;
   const sampled = task !== 'sensitivity'; // its evaluations vary one parameter at a time
   const all = [
-    seriesSection(data),
     bandSection(data),
     sensitivitySection(data),
+    seriesSection(data),
     parameterSection(data),
     resultSection(data),
     sampled ? progressSection(data) : null,

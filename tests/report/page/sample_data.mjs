@@ -74,7 +74,7 @@ function seriesOf(measure, days, draw, bestNumber) {
 }
 
 /** A search with `count` evaluations, `days` of daily series and `measures` measures with a series. */
-export function optimisation({ count = 2000, days = 7305, measures = 1, algorithm = 'SCE' } = {}) {
+export function optimisation({ count = 400, days = 1500, measures = 1, algorithm = 'SCE' } = {}) {
   const draw = random(7);
   const parameters = kParameters.map(([name, lower, upper, start, transformation]) => (
     { name, lower, upper, start, best: start, kind: 'variable', transformation, integer: false, nearBound: null }));
@@ -82,6 +82,7 @@ export function optimisation({ count = 2000, days = 7305, measures = 1, algorith
   const best = evaluations.aggregate.reduce((at, value, place) => (value !== null && value <= (evaluations.aggregate[at] ?? Infinity) ? place : at), 0);
   parameters.forEach((parameter, index) => { parameter.best = evaluations.parameters[index][best]; });
   parameters[3].nearBound = 'upper';
+  parameters[0].comment = 'capacity of the production store, mm';
   parameters.push({ name: 'area', lower: null, upper: null, start: 771, best: 771, kind: 'fixed', transformation: 'none', integer: false, nearBound: null });
   const failed = evaluations.ok.filter((ok) => ok === 0).length;
   const value = evaluations.aggregate;
@@ -100,19 +101,19 @@ export function optimisation({ count = 2000, days = 7305, measures = 1, algorith
 
 export function uncertainty() {
   const draw = random(11);
-  const data = { ...optimisation({ count: 500 }), series: [] };
-  data.run = { ...baseRun('uncertainty', 'Uncertainty analysis: Latin hypercube', 500, 2) };
-  data.evaluations = evaluationsOf(data.parameters.slice(0, 6), 500, draw, false);
-  const observed = river(3287, draw);
+  const data = { ...optimisation({ count: 200 }), series: [] };
+  data.run = { ...baseRun('uncertainty', 'Uncertainty analysis: Latin hypercube', 200, 2) };
+  data.evaluations = evaluationsOf(data.parameters.slice(0, 6), 200, draw, false);
+  const observed = river(1200, draw);
   const spread = observed.map(() => 0.2 + 0.3 * draw());
   const scaled = (sign) => observed.map((value, day) => (day > 900 && day < 950 ? null : round(value * (1 + sign * spread[day]))));
-  data.band = [{ measure: 'Discharge RMSE', start: '1981-10-01T00:00:00', step: kDay, count: 3287, observed: observed.map((value) => round(value * (0.6 + 0.8 * draw()))),
+  data.band = [{ measure: 'Discharge RMSE', start: '1981-10-01T00:00:00', step: kDay, count: 1200, observed: observed.map((value) => round(value * (0.6 + 0.8 * draw()))),
     p5: scaled(-1), p50: scaled(0.1), p95: scaled(1), inside: 0.6152, n: 3287 }];
   return data;
 }
 
 export function sensitivity() {
-  const data = { ...optimisation({ count: 13 }), series: [] };
+  const data = { ...optimisation({ count: 13, days: 9 }), series: [] };
   data.run = baseRun('sensitivity', 'Local sensitivity analysis: central differences', 13, 0);
   const names = kParameters.map(([name]) => name);
   const square = (of) => names.map((_, row) => names.map((__, column) => round(of(row, column))));
@@ -140,7 +141,7 @@ export function scenarios() {
 export function empty() {
   return {
     format: 1, program: 'Mirevo 0.2.0',
-    run: { ...baseRun('optimisation', 'Parameter optimisation: Dynamically Dimensioned Search', 0, 0), state: 'running or cut off', ended: null, message: null },
+    run: { ...baseRun('optimisation', 'Parameter optimisation: Dynamically Dimensioned Search', 0, 0), state: 'running', ended: null, message: null },
   };
 }
 

@@ -12,7 +12,8 @@ interface Finding {
 
 const kStates = {
   finished: { mark: '\u2713', text: 'Finished', kind: 'good' },
-  'running or cut off': { mark: '\u2026', text: 'Running or cut off', kind: 'warning' },
+  running: { mark: '\u2026', text: 'Running', kind: 'warning' },
+  'cut off': { mark: '\u2026', text: 'Cut off', kind: 'warning' },
   cancelled: { mark: '\u25a0', text: 'Cancelled', kind: 'warning' },
   failed: { mark: '\u2715', text: 'Failed', kind: 'bad' },
 } as const;
@@ -123,9 +124,10 @@ function rangeBar(parameter: Parameter): Node | string {
 
 function parameterRow(parameter: Parameter): (Node | string | null)[] {
   const traits = [parameter.kind === 'variable' ? null : parameter.kind, parameter.transformation === 'logarithmic' ? 'logarithmic' : null,
-    parameter.integer ? 'integer' : null].filter(Boolean).join(', ');
+    parameter.integer ? 'integer' : null, parameter.equation ? `= ${parameter.equation}` : null].filter(Boolean).join(', ');
   return [
-    parameter.name, number(parameter.lower, 10), number(parameter.upper, 10), number(parameter.start, 6), number(parameter.best, 10),
+    make('span', {}, parameter.name, parameter.comment ? make('small', {}, parameter.comment) : null),
+    number(parameter.lower, 10), number(parameter.upper, 10), number(parameter.start, 6), number(parameter.best, 10),
     rangeBar(parameter),
     parameter.nearBound ? make('span', { class: 'flag' }, `near ${parameter.nearBound} bound`) : traits,
   ];

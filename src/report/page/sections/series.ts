@@ -35,12 +35,16 @@ const lineStyles = (look: Look) => ({
 /** Names that fit a small chart. */
 const short = (simulated: Simulated[]) => simulated.map((one) => ({ ...one, name: one.key }));
 
-/** Areas outside the evaluation period, where nothing is judged. */
-export function outsidePeriod(look: Look, times: number[], period: [number, number] | null | undefined): object {
+function outside(times: number[], period: Series['period']): [number, number][] {
   const [first, last] = [times[0], times[times.length - 1]];
-  if (!period || first === undefined || last === undefined) return {};
-  const areas = [[first, period[0]], [period[1], last]].filter(([from, to]) => to! > from!);
-  return { markArea: { silent: true, itemStyle: { color: look.rule, opacity: 0.45 }, data: areas.map(([from, to]) => [{ xAxis: from }, { xAxis: to }]) } };
+  if (!period || first === undefined || last === undefined) return [];
+  return ([[first, period[0]], [period[1], last]] as [number, number][]).filter(([from, to]) => to > from);
+}
+
+// Areas outside the evaluation period, where nothing is judged.
+function outsidePeriod(look: Look, times: number[], period: Series['period']): object {
+  const areas = outside(times, period);
+  return areas.length === 0 ? {} : { markArea: { silent: true, itemStyle: { color: look.rule, opacity: 0.45 }, data: areas.map(([from, to]) => [{ xAxis: from }, { xAxis: to }]) } };
 }
 
 function hydrographPlan(data: ReportData, series: Series): ChartPlan {
@@ -54,7 +58,7 @@ function hydrographPlan(data: ReportData, series: Series): ChartPlan {
   const step = times.length > 1 ? times[1]! - times[0]! : 86400000;
   return {
     title: 'Simulated and observed, and the residuals',
-    note: `Residual: ${judged ? shorten(judged.name, 60) : 'simulated'} less observed.${series.period ? ' Shaded: outside the evaluation period.' : ''} Drag across the chart to zoom in, move the slider below to go along.`,
+    note: `Residual: ${judged ? shorten(judged.name, 60) : 'simulated'} less observed.${outside(times, series.period).length > 0 ? ' Shaded: outside the evaluation period.' : ''} ${series.thinned ? ' Of so many times the extremes of short spans are drawn.' : ''} Drag across the chart to zoom in, move the slider below to go along.`,
     height: 492,
     zoom: 'x',
     switches: [{ key: 'log', label: 'Log' }],
@@ -70,7 +74,7 @@ function hydrographPlan(data: ReportData, series: Series): ChartPlan {
         dataset: { source, dimensions: ['time', ...Object.keys(source).filter((key) => key !== 'time')] },
         legend: legend(look, { data: ['observed', ...simulated.map(({ name }) => name)] }),
         axisPointer: { link: [{ xAxisIndex: 'all' }], lineStyle: { color: look.muted } },
-        grid: [{ left: 64, right: 16, top: 36, height: 262 }, { left: 64, right: 16, top: 338, height: 92 }],
+        grid: [{ left: 64, right: 16, top: 36, height: 262 }, { left: 64, right: 16, top: 338, height: 86 }],
         xAxis: [
           axis(look, { type: 'time', min: times[0], max: times[times.length - 1], axisLabel: { show: false }, axisTick: { show: false } }),
           axis(look, { type: 'time', gridIndex: 1, min: times[0], max: times[times.length - 1], axisLine: { onZero: false } }),
@@ -164,20 +168,25 @@ function scatterPlan(data: ReportData, series: Series): ChartPlan {
   };
 }
 
+// Of a thinned series the curve of all its values comes with the data.
+function givenCurve({ flowDuration }: Series, key: 'observed' | 'initial' | 'best'): [number, number][] | null {
+  const values = flowDuration?.[key];
+  if (!values) return null;
+  return flowDuration!.exceedance.flatMap((share, index): [number, number][] => (values[index] == null ? [] : [[share, values[index]!]]));
+}
+
 function durationPlan(data: ReportData, series: Series): ChartPlan {
   const places = judgedPlaces(series);
   const curves = [
     ...short(simulations(data, series)),
     { key: 'observed' as const, name: 'observed', values: series.observed },
   ].map((curve) => {
-    // What is compared are the same times for all: without a simulated value there is none of any.
-    const points = durationCurve(places.map((place) => curve.values[place] ?? null));
+    const points = givenCurve(series, curve.key) ?? durationCurve(places.map((place) => curve.values[place] ?? null));
     return { ...curve, points: spaced(points.length, kCurvePoints).map((index) => points[index]!) };
   });
   const positive = curves.every(({ points }) => points.some(([, value]) => value > 0));
   return {
     title: 'Duration curve',
-    note: '',
     height: 340,
     small: true,
     zoom: 'xy',
