@@ -9,6 +9,7 @@ import { grid, paragraph, type Section } from './section';
 
 const kGoodShare = 0.1;
 const kLinesDrawn = 300;
+const dotSize = (dots: number) => (dots < 500 ? 5 : 3);
 
 /** What an evaluation can be judged by: the aggregate, the objective functions, the measures. */
 export interface Judgement {
@@ -57,7 +58,7 @@ function progressPlan(data: ReportData): ChartPlan {
         tooltip: tooltip(look, { formatter: (point: { seriesName: string; value: number[] }) =>
           tip(`Evaluation ${count(point.value[0]!)}`, point.seriesName === 'failed' ? [['failed', '']] : [[point.seriesName, number(point.value[1], 6)]]) }),
         series: [
-          { name: 'evaluation', type: 'scatter', data: pairs(aggregate), symbolSize: 3, large: true, largeThreshold: 3000,
+          { name: 'evaluation', type: 'scatter', data: pairs(aggregate), symbolSize: dotSize(numbers.length), large: true, largeThreshold: 3000,
             clip: true, itemStyle: { color: look.dots, opacity: 0.75 } },
           { name: 'best so far', type: 'line', step: 'end', data: steps, symbol: 'none', clip: true,
             lineStyle: { color: look.best, width: 2.5 }, itemStyle: { color: look.best } },
@@ -94,7 +95,7 @@ function dottyPlan(data: ReportData, parameter: Parameter, column: Maybe[], judg
         tooltip: tooltip(look, { formatter: (point: { value: number[] }) => tip(`Evaluation ${count(point.value[2]!)}`,
           [[shorten(parameter.name, 40), number(point.value[0], 6)], [shorten(name, 40), number(point.value[1], 6)]]) }),
         series: [
-          { type: 'scatter', symbolSize: 3, itemStyle: { color: look.dots, opacity: 0.7 },
+          { type: 'scatter', symbolSize: dotSize(places.length), itemStyle: { color: look.dots, opacity: 0.7 },
             data: places.map((place) => [column[place], values[place], data.evaluations.numbers[place]]) },
           { type: 'scatter', symbol: 'diamond', symbolSize: 13, z: 5, itemStyle: { color: look.best, borderColor: look.surface, borderWidth: 1 },
             data: best === undefined ? [] : [[column[best], values[best], data.evaluations.numbers[best]]] },
