@@ -27,6 +27,7 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
   if (!leftBehind.empty()) {
     observer_.warning(withNumber("Evaluation of parameter set No. %: ", result.number).append(leftBehind));
   }
+  warnOfUnusedObservations(result);
   for (const std::string& text : result.warnings) {
     observer_.warning(withNumber("Evaluation of parameter set No. %: ", result.number) + text);
   }
@@ -43,6 +44,15 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
   ++finishedCount_;
 }
 
+void EvaluationLedger::warnOfUnusedObservations(const EvaluationResult& result) {
+  for (const UnusedObservations& unused : result.unusedObservations) {
+    const auto [fewest, isFirst] = fewestUsed_.try_emplace(unused.measure, unused.usedCount);
+    if (!isFirst && fewest->second <= unused.usedCount) continue;
+    fewest->second = unused.usedCount;
+    observer_.warning(withNumber("Evaluation of parameter set No. %: ", result.number) + unused.text);
+  }
+}
+
 std::vector<EvaluationResult> EvaluationLedger::end() {
   evaluationCount_ += static_cast<int>(sets_.size());
   sets_ = {};
@@ -51,13 +61,15 @@ std::vector<EvaluationResult> EvaluationLedger::end() {
   return std::exchange(results_, {});
 }
 
-void settleAggregates(ObjectiveAggregator& aggregator, std::span<EvaluationResult> sample) {
+void settleAggregates(ObjectiveAggregator& aggregator, std::span<EvaluationResult> sample,
+                      EvaluationObserver& observer) {
   if (aggregator.isSettled()) return;
   std::vector<std::vector<double>> succeeded;
   for (const EvaluationResult& result : sample) {
     if (result.ok()) succeeded.push_back(result.objectiveValues);
   }
   aggregator.fit(succeeded);
+  for (const std::string& line : aggregator.scaleLines()) observer.message(line);
   for (EvaluationResult& result : sample) {
     if (result.ok()) result.aggregate = aggregator.aggregate(result.objectiveValues);
   }

@@ -66,7 +66,7 @@ void LocalEvaluator::stopIfCancelled() {
 }
 
 void LocalEvaluator::settleAggregates(std::span<EvaluationResult> sample) {
-  mirevo::settleAggregates(runner_.aggregator(), sample);
+  mirevo::settleAggregates(runner_.aggregator(), sample, observer_);
 }
 
 }  // namespace mirevo

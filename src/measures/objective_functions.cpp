@@ -170,4 +170,15 @@ void ObjectiveAggregator::fit(std::span<const std::vector<double>> sample) {
   }
 }
 
+std::vector<std::string> ObjectiveAggregator::scaleLines() const {
+  std::vector<std::string> lines;
+  if (!usesTransformation(method_) || !isSettled()) return lines;
+  const char* muName = method_ == AggregationMethod::commonProbability ? "Mean" : "Location parameter";
+  for (std::size_t i = 0; i < names_.size(); ++i) {
+    lines.push_back(fmt::format("Scale of {}: Standard deviation = {}, {} = {}", names_[i], formatReal(sigma_[i]),
+                                muName, formatReal(mu_[i])));
+  }
+  return lines;
+}
+
 }  // namespace mirevo

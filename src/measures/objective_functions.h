@@ -48,6 +48,9 @@ class ObjectiveAggregator final {
   /// distance from zero. Throws FatalError naming an objective function that is constant over the sample.
   void fit(std::span<const std::vector<double>> sample);
 
+  /// The scale of each objective function as a line for people, once all are known; none where the method has no scale.
+  std::vector<std::string> scaleLines() const;
+
   AggregationMethod method() const { return method_; }
   const std::vector<double>& sigma() const { return sigma_; }
   const std::vector<double>& mu() const { return mu_; }

@@ -14,6 +14,11 @@ std::size_t RunConfig::variableParameterCount() const {
       [](const ModelParameter& parameter) { return parameter.parameterType == ParameterType::variable; }));
 }
 
+bool RunConfig::drawsRandomNumbers() const {
+  return simulationOption == SimulationOption::parameterOptimisation ||
+         simulationOption == SimulationOption::uncertaintyAnalysis;
+}
+
 int RunConfig::plannedEvaluations() const {
   switch (simulationOption) {
     case SimulationOption::scenarioRuns:

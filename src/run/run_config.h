@@ -74,12 +74,15 @@ struct RunConfig {
   std::int32_t randomSeed = 1;  ///< of the initial sample and of the uncertainty analysis: one setting
 
   std::int32_t simultaneousSimulations = 1;
+  bool usesMpiWorkers = false;  ///< then `simultaneousSimulations` is 1, on each worker
   bool useSingleThread = false;
   std::string processFolder;  ///< where the process folders are made; empty: beside the setup
 
   /// Model evaluations that the task plans; sizes the failed-run limit and the progress report. 0 where the simulation
   /// option names no task.
   int plannedEvaluations() const;
+  /// Whether the task's results depend on the random seed.
+  bool drawsRandomNumbers() const;
   std::size_t variableParameterCount() const;
 };
 

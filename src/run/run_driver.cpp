@@ -7,7 +7,6 @@
 #include <fmt/format.h>
 
 #include "common/fatal_error.h"
-#include "common/files.h"
 #include "common/text.h"
 #include "evaluation/local_evaluator.h"
 #include "evaluation/mpi_evaluator.h"
@@ -51,12 +50,13 @@ int RunDriver::run(const std::string& setupFileName) {
     startMpi(state_);
     if (state_.mpiRank > 0) return runWorker(state_.mpi);
     openRun(setupFileName);
-    config_ = readSetupFile(setupFileName, state_.log);
-    if (state_.mpiInUse) config_.simultaneousSimulations = 1;  // a model run a worker
+    const std::string setupText = readSetupText(setupFileName);
+    config_ = readSetup(setupFileName, setupText, state_.log, state_.mpiInUse);
     buildModel();
-    if (state_.mpiInUse) startWorkers();
     logSetup();
     openResults();
+    // Not before earlier results have been renamed: where they lie in the base folder, workers look at them.
+    if (state_.mpiInUse) beginWorkers(state_.mpi, {config_.setupFile, setupText});
     state_.progress.writeMessage("Title: " + config_.title);
     state_.progress.writeStatus(taskName(config_));
     state_.progress.progressEvaluationLabel(config_.plannedEvaluations());
@@ -111,13 +111,6 @@ void RunDriver::buildModel() {
                                           launcherSettings(config_, slotCount));
 }
 
-void RunDriver::startWorkers() {
-  std::string reason;
-  auto text = readTextFile(config_.setupFile, reason);
-  if (!text) fatalError("Error: Unable to open " + config_.setupFile, reason);
-  beginWorkers(state_.mpi, {config_.setupFile, std::move(*text)});
-}
-
 void RunDriver::logSetup() {
   state_.log.line("");
   state_.log.line(setupSummary(config_, parameters_->searchSpace(), parameters_->evaluationOrder()));
@@ -168,18 +161,18 @@ void RunDriver::openResultFile() {
   columns.parameters = parameters_->searchSpace().names;
   for (const OutputMeasure& measure : config_.measures) columns.measures.push_back(measure.name);
   for (const ObjectiveFunction& objective : config_.objectives) columns.objectives.push_back(objective.name);
-  const std::vector<std::string> head{config_.title,
-                                      fmt::format("Mirevo {}", programVersion()),
-                                      taskName(config_),
-                                      fmt::format("Random seed: {}", config_.randomSeed),
-                                      "Setup file: " + config_.setupFile,
-                                      "Started: " + dateAndTimeNow()};
+  std::vector<std::string> head{config_.title, fmt::format("Mirevo {}", programVersion()), taskName(config_)};
+  if (config_.drawsRandomNumbers()) head.push_back(fmt::format("Random seed: {}", config_.randomSeed));
+  head.push_back("Setup file: " + config_.setupFile);
+  head.push_back("Started: " + dateAndTimeNow());
   results_.open(path, head, columns);
 }
 
 std::vector<std::string> RunDriver::closingLines(std::string_view terminationMessage) const {
   std::vector<std::string> lines{std::string(terminationMessage)};
   if (!reporter_ || !reporter_->best()) return lines;
+  const std::vector<std::string> scales = aggregator_->scaleLines();
+  lines.insert(lines.end(), scales.begin(), scales.end());
   const RunReporter::Best& best = *reporter_->best();
   lines.push_back(fmt::format("Best evaluation: {}", best.number));
   lines.push_back("Best aggregate: " + formatReal(best.aggregate));
@@ -212,8 +205,8 @@ void RunDriver::finish(const TaskOutcome& outcome) {
     fatalError("Error: Unable to write to " + state_.log.path(), state_.log.writeError());
   }
   signalState.runLogDescriptor = -1;
-  state_.log.close();
   leaveJob(0, kNormalTermination);
+  state_.log.close();
   state_.progress.progressEnd(kNormalTermination);
 }
 
@@ -252,8 +245,13 @@ int RunDriver::endEarly(std::string_view ending) {
 void RunDriver::leaveJob(int exitCode, std::string_view ending) {
   if (!state_.mpiInUse) return;
   std::string reason = "a worker did not answer the request to stop";
+  const auto warn = [this, exitCode](const std::string& text) {
+    if (exitCode != 0) return;  // the run has failed already, with the first reason
+    state_.log.warning(text);
+    showMessage("Warning: " + text);
+  };
   try {
-    if (stopWorkers(state_.mpi, exitCode == 0 ? kWorkerPatienceSeconds : kWorkerStopSeconds)) {
+    if (stopWorkers(state_.mpi, exitCode == 0 ? kWorkerPatienceSeconds : kWorkerStopSeconds, warn)) {
       state_.mpi.finalise(kWorkerStopSeconds);
       return;
     }

@@ -160,10 +160,7 @@ std::string setupSummary(const RunConfig& config, const SearchSpace& space, std:
                config.parameterFiles.size(), config.savedOutputFiles.size());
   summary.addParameters(space, evaluationOrder);
   summary.addMeasures();
-  if (config.simulationOption == SimulationOption::parameterOptimisation ||
-      config.simulationOption == SimulationOption::uncertaintyAnalysis) {
-    summary.line("Random seed: {}", config.randomSeed);
-  }
+  if (config.drawsRandomNumbers()) summary.line("Random seed: {}", config.randomSeed);
   summary.line("Model evaluations planned: {}", config.plannedEvaluations());
   summary.line("Simultaneous simulations: {}{}", config.simultaneousSimulations,
                config.useSingleThread ? ", one thread each" : "");

@@ -182,6 +182,7 @@ TEST_F(LocalEvaluatorTest, SettlesTheTransformationFromTheSampleWithoutItsFailur
   EXPECT_NEAR(sample[0].aggregate, 0.23975006109347674, 1e-12);
   EXPECT_NEAR(sample[2].aggregate, 0.7602499389065233, 1e-12);
   EXPECT_EQ(sample[1].aggregate, kFailedRunValue);
+  EXPECT_THAT(observer_.events.back(), ::testing::HasSubstr("Standard deviation = 1.414"));
 }
 
 TEST_F(LocalEvaluatorTest, RunsRealProcesses) {

@@ -91,11 +91,32 @@ TEST(Optimisation, ASecondRunGivesTheSameBitsAndKeepsTheFilesOfTheFirst) {
   EXPECT_EQ(folder.read("basin.1.log"), firstLog);
 }
 
+TEST(Optimisation, PseWritesTheSameBitsWhateverOrderItsModelRunsEndIn) {
+  const ModelFolder folder;
+  folder.write("model/run.sh", fmt::format("#!/bin/sh\n{}\nexec {}\n", kSleepByParameters, MIREVO_TEST_MODEL));
+  std::string ofOneSlot;
+  for (const int slots : {1, 2, 4}) {
+    ASSERT_EQ(runProgram({folder.writeSetup({.algorithm = 1, .maxEvaluations = 50, .slots = slots})}).exitCode, 0);
+    const std::string results = withoutDate(folder.read("basin_Optimisation.dat"));
+    if (slots == 1) ofOneSlot = results;
+    EXPECT_EQ(results, ofOneSlot) << slots << " slots";
+    std::vector<int> ended;
+    std::istringstream log(folder.read("basin.log"));
+    for (std::string line; std::getline(log, line);) {
+      const auto at = line.find(" completed: OK");
+      if (at != std::string::npos) ended.push_back(std::atoi(line.c_str() + line.rfind(' ', at - 1)));
+    }
+    ASSERT_EQ(ended.size(), 51U);
+    EXPECT_EQ(std::is_sorted(ended.begin(), ended.end()), slots == 1);
+  }
+}
+
 TEST(Scenarios, ASingleRunEvaluatesTheInitialSet) {
   const ModelFolder folder;
   ASSERT_EQ(runProgram({folder.writeSetup({.option = 0})}).exitCode, 0);
   const ResultTable table = readResults(folder.read("basin.dat"));
   ASSERT_EQ(table.rows.size(), 2U);
+  EXPECT_THAT(table.comments, Not(Contains(StartsWith("# Random seed"))));  // nothing is drawn
   EXPECT_THAT(std::vector(table.rows[1].begin(), table.rows[1].begin() + 4), ElementsAre("1", "OK", "4", "1"));
   // Simulated minus observed is -1 - sin(t / 58) over t = 0 ... 364.
   EXPECT_NEAR(number(table.rows[1][4]), 1.224418, 1e-5);

@@ -78,12 +78,14 @@ TEST(ObjectiveAggregator, TakesWhatTheSetupLeavesOpenFromTheSample) {
   EXPECT_THAT(probability.sigma(), ElementsAre(DoubleNear(1, 1e-14), DoubleNear(10, 1e-13)));
   EXPECT_THAT(probability.mu(), ElementsAre(DoubleNear(2, 1e-14), DoubleNear(30, 1e-13)));
   EXPECT_NEAR(probability.aggregate(sample[1]), 0.75, 1e-14);
+  EXPECT_EQ(probability.scaleLines().at(0), "Scale of Q: Standard deviation = 1, Mean = 2");
 
   // best/σ are 1 and 2: the offset of Q is 1, so that both best values lie at 2.
   ObjectiveAggregator distance(functions, AggregationMethod::commonDistance);
   distance.fit(sample);
   EXPECT_THAT(distance.mu(), ElementsAre(DoubleNear(1, 1e-14), DoubleNear(0, 1e-14)));
   EXPECT_NEAR(distance.aggregate(std::vector<double>{1, 20}), 2 + 0.5 * 2, 1e-13);
+  EXPECT_EQ(distance.scaleLines().at(1), "Scale of H: Standard deviation = 10, Location parameter = 0");
 
   // What the setup gives stays, also against the sample.
   functions[0].standardDeviation = 4.0;
@@ -95,6 +97,7 @@ TEST(ObjectiveAggregator, TakesWhatTheSetupLeavesOpenFromTheSample) {
 
   for (const AggregationMethod method : {AggregationMethod::none, AggregationMethod::zero}) {
     EXPECT_TRUE(ObjectiveAggregator(functions, method).isSettled());
+    EXPECT_TRUE(ObjectiveAggregator(functions, method).scaleLines().empty());
   }
 }
 

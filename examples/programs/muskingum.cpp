@@ -1,0 +1,22 @@
+// Muskingum routing between two gauges, a program like any other that could be calibrated. models/model_programs.h
+// describes its files. The simulated file appears under its name only when it is complete. Exit code: 0, or 1 with one
+// line of explanation on standard error.
+
+#include <cstdio>
+#include <exception>
+
+#include "models/model_programs.h"
+
+int main(int argc, char** argv) {
+  if (argc != 5) {
+    std::fputs("Usage: muskingum PARAMETER_FILE UPSTREAM_CSV LATERAL_CSV SIMULATED_CSV\n", stderr);
+    return 1;
+  }
+  try {
+    models::runRiver(argv[1], argv[2], argv[3], argv[4]);
+  } catch (const std::exception& error) {
+    std::fprintf(stderr, "muskingum: %s\n", error.what());
+    return 1;
+  }
+  return 0;
+}
