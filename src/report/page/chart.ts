@@ -174,7 +174,7 @@ function zooming(zoom: ChartPlan['zoom'], option: Option): Option {
 }
 
 // One style for all: the library sets the larger units in bold.
-const kTimeLabels = { year: '{yyyy}', month: '{MMM} {yyyy}', day: '{d} {MMM}', hour: '{HH}:{mm}', minute: '{HH}:{mm}', second: '{HH}:{mm}:{ss}' };
+const kTimeLabels = { year: '{yyyy}', month: '{MMM}', day: '{d} {MMM}', hour: '{HH}:{mm}', minute: '{HH}:{mm}', second: '{HH}:{mm}:{ss}' };
 
 export interface AxisPlan {
   name?: string;

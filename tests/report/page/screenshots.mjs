@@ -4,9 +4,7 @@ import { openBrowser } from './browser.mjs';
 
 const [report, folder] = process.argv.slice(2);
 const kPictures = [
-  ['report-head', 'light', '.head'],
   ['report-series', 'light', '#series'],
-  ['report-progress', 'light', '#progress figure'],
   ['report-dotty', 'dark', '#dotty'],
 ];
 
