@@ -29,7 +29,12 @@ async function bundle(entry) {
 // What would end the element that holds the text; in scripts it can only stand in strings and comments.
 const inScript = (text) => text.replaceAll('</script', '<\\/script').replaceAll('<!--', '<\\!--');
 
+// What the licences of the bundled packages ask to go along with every copy.
+const kLicences = ['echarts/LICENSE', 'echarts/NOTICE', 'zrender/LICENSE', 'tslib/LICENSE.txt'];
+const licences = kLicences.map((file) => `${file}\n\n${readFileSync(join(packages, file), 'utf8')}`).join('\n\n');
+
 const parts = {
+  '@REPORT_LICENCES@': inScript(licences),
   '@REPORT_STYLES@': await bundle('report.css'),
   '@REPORT_SCRIPT@': inScript(await bundle('main.ts')),
 };

@@ -156,9 +156,20 @@ export function tip(headline: string, lines: [string, string][] = []): HTMLEleme
 }
 
 // Dragging selects what to zoom to; the wheel zooms only with Ctrl, as it scrolls the page otherwise.
+const inside = { type: 'inside', zoomOnMouseWheel: 'ctrl', moveOnMouseMove: false, moveOnMouseWheel: false };
+
+/** Zoom along a time axis, with a slider below the chart. `filterMode` 'filter' lets the other axis follow what is shown. */
+export function timeZoom(look: Look, xAxisIndex: number[], filterMode: 'filter' | 'none', labelFormatter: (time: number) => string): object[] {
+  return [
+    { ...inside, xAxisIndex, filterMode },
+    { type: 'slider', xAxisIndex, filterMode, labelFormatter, height: 26, bottom: 8, left: 64, right: 16, showDataShadow: false, brushSelect: false,
+      borderColor: look.rule, fillerColor: `${look.band}33`, textStyle: { color: look.muted },
+      handleStyle: { color: look.surface, borderColor: look.muted }, moveHandleStyle: { color: look.muted } },
+  ];
+}
+
 function zooming(zoom: ChartPlan['zoom'], option: Option): Option {
   if (!zoom) return {};
-  const inside = { type: 'inside', zoomOnMouseWheel: 'ctrl', moveOnMouseMove: false, moveOnMouseWheel: false };
   const all = (axis: unknown) => (Array.isArray(axis) ? axis.map((_, index) => index) : [0]);
   return {
     toolbox: {

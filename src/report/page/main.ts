@@ -47,7 +47,7 @@ function build(place: HTMLElement): void {
     contents(shown),
     make('main', {}, head(data),
       ...shown.map(({ id, title, content }) => make('section', { id, 'aria-label': title }, make('h2', {}, title), ...content)),
-      make('footer', {}, `${data.program}, ${data.run.reportMade}. Charts drawn with Apache ECharts (Apache License 2.0).`)));
+      make('footer', {}, `${data.program}, ${data.run.reportMade}. Charts drawn with Apache ECharts (Apache License 2.0; its text and those of what it uses stand in the source of this page).`)));
 }
 
 const place = document.getElementById('report')!;

@@ -1,5 +1,5 @@
 // Simulated against observed series: how well it fits, when it does not, and over which range of values.
-import { axis, chart, legend, tip, tooltip, type ChartPlan } from '../chart';
+import { axis, chart, legend, timeZoom, tip, tooltip, type ChartPlan } from '../chart';
 import { timesOf, type Figures, type Maybe, type ReportData, type Series } from '../data';
 import { shorten, table } from '../dom';
 import { count, moment, number } from '../format';
@@ -7,7 +7,6 @@ import type { Look } from '../look';
 import { durationCurve, finite, spaced, thin } from '../numbers';
 import { grid, heading, type Section } from './section';
 
-const kDots = 20000; // of a scatter plot's cells; more than that many are never drawn
 const kCurvePoints = 700;
 
 interface Simulated {
@@ -83,13 +82,7 @@ function hydrographPlan(data: ReportData, series: Series): ChartPlan {
           axis(look, { name: unitOf(series), log: is('log'), nameGap: 48, ...(is('log') ? {} : { scale: false }) }),
           axis(look, { name: 'Residual', gridIndex: 1, nameGap: 48, splitNumber: 2, scale: false }),
         ],
-        dataZoom: [
-          { type: 'inside', xAxisIndex: [0, 1], zoomOnMouseWheel: 'ctrl', moveOnMouseMove: false, moveOnMouseWheel: false, filterMode: 'filter' },
-          { type: 'slider', xAxisIndex: [0, 1], height: 26, bottom: 8, left: 64, right: 16, filterMode: 'filter', showDataShadow: false,
-            borderColor: look.rule, fillerColor: `${look.band}33`, textStyle: { color: look.muted }, brushSelect: false,
-            handleStyle: { color: look.surface, borderColor: look.muted }, moveHandleStyle: { color: look.muted },
-            labelFormatter: (value: number) => moment(value, step) },
-        ],
+        dataZoom: timeZoom(look, [0, 1], 'filter', (time) => moment(time, step)),
         tooltip: tooltip(look, {
           trigger: 'axis',
           formatter: (points: { seriesName: string; dataIndex: number }[]) => {
@@ -140,7 +133,7 @@ function scatterPlan(data: ReportData, series: Series): ChartPlan {
       const scaled = (values: Maybe[]) => onLog(values, is('log')).map((value) => (value !== null && is('log') ? Math.log(value) : value));
       const dots = simulated.map(({ key, name, values }) => {
         const column = places.map((place) => values[place] ?? null);
-        const drawn = thin(scaled(observed), scaled(column), 240, 200).slice(0, kDots);
+        const drawn = thin(scaled(observed), scaled(column), 240, 200);
         return { key, name, data: drawn.map((at) => [observed[at]!, column[at]!, places[at]!]) };
       });
       const all = dots.flatMap(({ data: points }) => points.flatMap(([x, y]) => [x!, y!]));

@@ -1,5 +1,5 @@
 // What the samples of an uncertainty analysis say: distributions, and the band of every simulated series.
-import { axis, chart, legend, tip, tooltip, type ChartPlan } from '../chart';
+import { axis, chart, legend, timeZoom, tip, tooltip, type ChartPlan } from '../chart';
 import { timesOf, variableParameters, type Band, type Maybe, type ReportData } from '../data';
 import { count, moment, number, percent } from '../format';
 import { finite, histogram, spaced, type Bin } from '../numbers';
@@ -102,13 +102,7 @@ function bandPlan(band: Band): ChartPlan {
         grid: { left: 64, right: 16, top: 36, bottom: 72 },
         xAxis: [axis(look, { type: 'time', min: first, max: last })],
         yAxis: axis(look, { name: band.unit || 'Value', log: is('log'), nameGap: 48, ...(is('log') ? {} : { scale: false }) }),
-        dataZoom: [
-          { type: 'inside', xAxisIndex: [0], zoomOnMouseWheel: 'ctrl', moveOnMouseMove: false, moveOnMouseWheel: false, filterMode: 'none' },
-          { type: 'slider', xAxisIndex: [0], height: 26, bottom: 8, left: 64, right: 16, filterMode: 'none', showDataShadow: false,
-            borderColor: look.rule, fillerColor: `${look.band}33`, textStyle: { color: look.muted }, brushSelect: false,
-            handleStyle: { color: look.surface, borderColor: look.muted }, moveHandleStyle: { color: look.muted },
-            labelFormatter: (value: number) => moment(value, step) },
-        ],
+        dataZoom: timeZoom(look, [0], 'none', (time) => moment(time, step)),
         tooltip: tooltip(look, { trigger: 'axis', formatter: (points: { dataIndex: number }[]) => {
           const place = points[points.length - 1]!.dataIndex;
           return tip(moment(times[place]!, step), [['observed', number(band.observed[place])], ['median', number(band.p50[place])],
