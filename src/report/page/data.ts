@@ -1,0 +1,203 @@
+// What the program writes into the page. Numbers that are missing, not a number or infinite are null. Everything that a run
+// does not have is absent or empty: the page shows a section only for what exists.
+
+export type Maybe = number | null;
+
+export interface Run {
+  title: string;
+  setup: string; // file name without its folder
+  setupName: string;
+  task: 'scenarios' | 'sensitivity' | 'optimisation' | 'uncertainty';
+  taskName: string;
+  started: string | null; // 2026-11-21 07:00:00, local time
+  ended: string | null;
+  reportMade: string;
+  state: 'finished' | 'running' | 'cut off' | 'cancelled' | 'failed';
+  message: string | null; // why it stopped
+  evaluations: number;
+  planned: number | null;
+  failed: number;
+  aggregation: string | null;
+  algorithm: 'SCE' | 'PSE' | 'DDS' | null;
+  surrogate: string | null;
+  populationSize: number | null;
+  period: [string, string] | null;
+  seed: number | null;
+  notes: string[];
+}
+
+export interface Parameter {
+  name: string;
+  comment?: string | null;
+  equation?: string | null; // of a dependent one
+  lower: Maybe;
+  upper: Maybe;
+  start: Maybe;
+  best: Maybe;
+  kind: 'variable' | 'fixed' | 'dependent';
+  transformation: 'none' | 'logarithmic';
+  integer: boolean;
+  nearBound: 'lower' | 'upper' | null;
+}
+
+export interface Measure {
+  name: string;
+  statistic: string;
+  weight: Maybe;
+  objective: string | null;
+  initial: Maybe;
+  best: Maybe;
+}
+
+export interface Objective {
+  name: string;
+  initial: Maybe;
+  best: Maybe;
+}
+
+export interface Failure {
+  reason: string;
+  count: number;
+  example: string | null;
+}
+
+/** Every evaluation in order of its number; each inner array is a column of `count` values. */
+export interface Evaluations {
+  count: number;
+  numbers: number[];
+  ok: number[]; // 1: model values obtained, 0: failed
+  aggregate: Maybe[];
+  parameters: Maybe[][]; // one column a variable parameter
+  objectives: Maybe[][];
+  measures: Maybe[][];
+}
+
+/** Times as they are given: either each of them or a start and a constant step in milliseconds. */
+export interface Times {
+  start?: string; // 1981-10-01T00:00:00, UTC
+  step?: number;
+  count?: number;
+  times?: number[]; // milliseconds since 1970, UTC
+}
+
+export interface Figures {
+  n: Maybe;
+  nse: Maybe;
+  kge: Maybe;
+  kgeR: Maybe;
+  kgeAlpha: Maybe;
+  kgeBeta: Maybe;
+  pbias: Maybe; // percent
+  rmse: Maybe;
+  r2: Maybe;
+}
+
+/** Values against the percentage of the time in which they are exceeded. */
+export interface FlowDuration {
+  exceedance: number[];
+  observed?: Maybe[];
+  initial?: Maybe[];
+  best?: Maybe[];
+}
+
+/** A simulated and an observed series. */
+export interface Series extends Times {
+  measure: string; // names of all measures that compare the two
+  unit: string | null;
+  observed: Maybe[];
+  initial?: Maybe[];
+  best?: Maybe[];
+  bestNumber?: number | null;
+  period?: [number, number] | null;
+  thinned?: boolean; // reduced to the extremes of short spans; figures and `flowDuration` are of all values
+  flowDuration?: FlowDuration;
+  figures?: { initial?: Figures | null; best?: Figures | null };
+}
+
+export interface Band extends Times {
+  measure: string;
+  unit?: string | null;
+  observed: Maybe[];
+  p5: Maybe[];
+  p50: Maybe[];
+  p95: Maybe[];
+  inside: Maybe; // share of the observed values within p5 to p95
+  n: Maybe;
+}
+
+export interface Covariance {
+  names: string[];
+  estimate: Maybe[];
+  standardDeviation: Maybe[];
+  lower95: Maybe[];
+  upper95: Maybe[];
+  correlation: Maybe[][];
+  leftOut: string[];
+}
+
+export interface Sensitivity {
+  parameters: string[];
+  outputs: string[];
+  derivatives: Maybe[][]; // one row a parameter, one column an output
+  dimensionless: Maybe[][];
+  composite: Maybe[];
+  ranking: string[];
+  covariance: Covariance | null;
+}
+
+export interface ReportData {
+  format: number;
+  program: string;
+  run: Run;
+  parameters: Parameter[];
+  measures: Measure[];
+  objectives: Objective[];
+  best: { number: number; aggregate: Maybe } | null;
+  initialNumber: number | null;
+  initialLabel?: string | null;
+  failures: Failure[];
+  evaluations: Evaluations;
+  series: Series[];
+  band: Band[];
+  sensitivity: Sensitivity | null;
+  summary: string[];
+}
+
+const kNoEvaluations: Evaluations = {
+  count: 0, numbers: [], ok: [], aggregate: [], parameters: [], objectives: [], measures: [],
+};
+
+/** The data with an empty value for every member that is absent. Throws where the text is not what this page reads. */
+export function readReportData(text: string): ReportData {
+  const data = JSON.parse(text) as ReportData;
+  if (data.format !== 1) throw new Error(`The data of this report have format ${data.format}; this page reads format 1.`);
+  const list = <T>(value: T[] | null | undefined): T[] => value ?? [];
+  return {
+    ...data,
+    run: { ...data.run, notes: list(data.run.notes) },
+    parameters: list(data.parameters),
+    measures: list(data.measures),
+    objectives: list(data.objectives),
+    best: data.best ?? null,
+    initialNumber: data.initialNumber ?? null,
+    failures: list(data.failures),
+    evaluations: { ...kNoEvaluations, ...data.evaluations },
+    series: list(data.series),
+    band: list(data.band),
+    sensitivity: data.sensitivity ?? null,
+    summary: list(data.summary),
+  };
+}
+
+/** The parameters that have a column in the evaluations. */
+export function variableParameters(data: ReportData): Parameter[] {
+  return data.parameters.filter((parameter) => parameter.kind === 'variable');
+}
+
+/** Milliseconds since 1970 of `length` values. */
+export function timesOf(times: Times, length: number): number[] {
+  if (times.times) return times.times;
+  const start = Date.parse(`${times.start ?? '1970-01-01T00:00:00'}Z`);
+  const step = times.step ?? 86400000;
+  return Array.from({ length }, (_, index) => start + index * step);
+}

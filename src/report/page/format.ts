@@ -1,0 +1,54 @@
+// Numbers and times as the whole page writes them, whatever the language of the browser.
+import type { Maybe } from './data';
+
+export const kMissing = '\u2013';
+
+/** `value` with `digits` significant digits and no trailing zeros; very large and very small ones with an exponent. */
+export function number(value: Maybe | undefined, digits = 4): string {
+  if (value === null || value === undefined || !Number.isFinite(value)) return kMissing;
+  if (value === 0) return '0';
+  const size = Math.abs(value);
+  if (size >= 1e7 || size < 1e-4) {
+    const [mantissa, exponent] = value.toExponential(digits - 1).split('e');
+    return minus(`${Number(mantissa)}e${Number(exponent)}`);
+  }
+  return minus(String(Number(value.toPrecision(digits))));
+}
+
+/** A count, its thousands set apart by a narrow space. */
+export function count(value: number): string {
+  return String(Math.round(value)).replace(/\B(?=(\d{3})+$)/g, '\u202f');
+}
+
+/** `count things`, in the singular where it is one. */
+export function counted(value: number, thing: string): string {
+  return `${count(value)} ${thing}${value === 1 ? '' : 's'}`;
+}
+
+export function percent(share: Maybe | undefined, digits = 3): string {
+  if (share === null || share === undefined || !Number.isFinite(share)) return kMissing;
+  return `${number(share * 100, digits)} %`;
+}
+
+/** 1981-10-01, with the time of day where `step` (milliseconds) is below a day. UTC, as the series are. */
+export function moment(time: number, step = 86400000): string {
+  const text = new Date(time).toISOString();
+  return step >= 86400000 ? text.slice(0, 10) : `${text.slice(0, 10)} ${text.slice(11, 16)}`;
+}
+
+/** How long it is from one `2026-11-21 07:00:00` to another, or null where that cannot be said. */
+export function duration(from: string | null, to: string | null): string | null {
+  if (!from || !to) return null;
+  const seconds = (Date.parse(`${to.replace(' ', 'T')}Z`) - Date.parse(`${from.replace(' ', 'T')}Z`)) / 1000;
+  if (!Number.isFinite(seconds) || seconds < 0) return null;
+  if (seconds < 120) return `${seconds} s`;
+  const minutes = Math.round(seconds / 60);
+  if (minutes < 120) return `${minutes} min`;
+  const hours = Math.floor(minutes / 60);
+  if (hours < 48) return `${hours} h ${minutes % 60} min`;
+  return `${Math.floor(hours / 24)} d ${hours % 24} h`;
+}
+
+function minus(text: string): string {
+  return text.replace(/-/g, '\u2212');
+}

@@ -1,0 +1,63 @@
+// Builds the page from the data that the program wrote into it.
+import { drawInTime, drawnOptions } from './chart';
+import { readReportData, type ReportData } from './data';
+import { make } from './dom';
+import { switchTheme } from './look';
+import { failureSection, head, parameterSection, resultSection, runSection, summarySection } from './sections/overview';
+import { dottySection, goodSetsSection, progressSection } from './sections/search';
+import type { Section } from './sections/section';
+import { sensitivitySection } from './sections/sensitivity';
+import { seriesSection } from './sections/series';
+import { bandSection, distributionSection } from './sections/uncertainty';
+
+function sections(data: ReportData): Section[] {
+  const { task } = data.run;
+  const sampled = task !== 'sensitivity'; // its evaluations vary one parameter at a time
+  const all = [
+    bandSection(data),
+    sensitivitySection(data),
+    seriesSection(data),
+    parameterSection(data),
+    resultSection(data),
+    sampled ? progressSection(data) : null,
+    task === 'uncertainty' ? distributionSection(data) : null,
+    sampled ? dottySection(data, task === 'uncertainty' ? 'Parameters against objectives' : 'Dotty plots') : null,
+    task === 'optimisation' ? goodSetsSection(data) : null,
+    failureSection(data),
+    runSection(data),
+    summarySection(data),
+  ];
+  return all.filter((section): section is Section => section !== null);
+}
+
+function contents(shown: Section[]): HTMLElement {
+  const links = new Map(shown.map(({ id, title }) => [id, make('a', { href: `#${id}` }, title)]));
+  const current = new IntersectionObserver((entries) => {
+    for (const entry of entries) links.get(entry.target.id)?.classList.toggle('current', entry.isIntersecting);
+  }, { rootMargin: '-20% 0px -70% 0px' });
+  queueMicrotask(() => shown.forEach(({ id }) => current.observe(document.getElementById(id)!)));
+  return make('nav', { 'aria-label': 'Contents' }, make('ol', {}, ...[...links.values()].map((link) => make('li', {}, link))),
+    make('button', { type: 'button', onclick: switchTheme }, 'Light / dark'));
+}
+
+function build(place: HTMLElement): void {
+  const data = readReportData(document.getElementById('report-data')!.textContent!);
+  const shown = sections(data);
+  place.append(
+    contents(shown),
+    make('main', {}, head(data),
+      ...shown.map(({ id, title, content }) => make('section', { id, 'aria-label': title }, make('h2', {}, title), ...content)),
+      make('footer', {}, `${data.program}, ${data.run.reportMade}. Charts drawn with Apache ECharts (Apache License 2.0; its text and those of what it uses stand in the source of this page).`)));
+}
+
+const place = document.getElementById('report')!;
+try {
+  build(place);
+  drawInTime(() => {
+    document.documentElement.dataset.drawn = String(Math.round(performance.now()));
+  });
+  Object.assign(window, { drawnOptions });
+} catch (error) {
+  place.append(make('p', { class: 'broken', role: 'alert' }, `This report cannot be shown: ${error instanceof Error ? error.message : String(error)}`));
+  throw error;
+}

@@ -1,0 +1,200 @@
+// The head of the report and its tables: what was run, with what, and what came of it.
+import { variableParameters, type Parameter, type ReportData } from '../data';
+import { make, shorten, table } from '../dom';
+import { count, counted, duration, kMissing, number, percent } from '../format';
+import { bestShare, placeBetweenBounds } from '../numbers';
+import { heading, paragraph, type Section } from './section';
+
+interface Finding {
+  kind: 'good' | 'plain' | 'warning';
+  text: string;
+}
+
+const kStates = {
+  finished: { mark: '\u2713', text: 'Finished', kind: 'good' },
+  running: { mark: '\u2026', text: 'Running', kind: 'warning' },
+  'cut off': { mark: '\u2026', text: 'Cut off', kind: 'warning' },
+  cancelled: { mark: '\u25a0', text: 'Cancelled', kind: 'warning' },
+  failed: { mark: '\u2715', text: 'Failed', kind: 'bad' },
+} as const;
+
+/** The name of a parameter, measure or objective in a sentence, isolated: its writing direction stays its own. */
+const named = (name: string) => `\u2068${shorten(name, 60)}\u2069`;
+
+function improvement(data: ReportData): Finding | null {
+  const { best, run, evaluations } = data;
+  if (run.task !== 'optimisation' || !best || best.aggregate === null) return null;
+  const place = data.initialNumber === null ? -1 : evaluations.numbers.indexOf(data.initialNumber);
+  const initial = place < 0 ? null : evaluations.aggregate[place] ?? null;
+  const found = `evaluation ${count(best.number)} of ${count(run.evaluations)}`;
+  if (initial === null) return { kind: 'good', text: `Best aggregate ${number(best.aggregate)}, found by ${found}.` };
+  const from = `The aggregate fell from ${number(initial)} (${data.initialLabel ?? 'initial parameters'}) to ${number(best.aggregate)}`;
+  const share = initial !== 0 ? ` (${percent((best.aggregate - initial) / Math.abs(initial))})` : '';
+  return best.aggregate < initial
+    ? { kind: 'good', text: `${from}${share}, found by ${found}.` }
+    : { kind: 'warning', text: `No evaluation was better than the ${data.initialLabel ?? 'initial parameters'} (aggregate ${number(initial)}).` };
+}
+
+function findings(data: ReportData): Finding[] {
+  const { run } = data;
+  const found: (Finding | null)[] = [];
+  if (run.message) found.push({ kind: run.state === 'finished' ? 'plain' : 'warning', text: run.message });
+  found.push(improvement(data));
+  for (const series of data.series.slice(0, 3)) {
+    const figures = series.figures?.best;
+    if (!figures) continue;
+    const text = `${named(series.measure)} in the evaluation period: NSE ${number(figures.nse, 3)}, KGE ${number(figures.kge, 3)}, bias ${number(figures.pbias, 3)} %.`;
+    found.push({ kind: 'plain', text });
+  }
+  for (const band of data.band.slice(0, 3)) {
+    found.push({ kind: 'plain', text: `${percent(band.inside)} of the observed values of ${named(band.measure)} lie within the 5 to 95 % band.` });
+  }
+  if (data.sensitivity && data.sensitivity.ranking.length > 0) {
+    const first = data.sensitivity.ranking.slice(0, 3).map(named).join(', ');
+    found.push({ kind: 'plain', text: `Most sensitive: ${first}.` });
+  }
+  const near = data.parameters.filter((parameter) => parameter.nearBound);
+  if (near.length > 0) {
+    const names = near.slice(0, 6).map((parameter) => `${named(parameter.name)} (${parameter.nearBound})`).join(', ');
+    const rest = near.length > 6 ? ` and ${near.length - 6} more` : '';
+    found.push({ kind: 'warning', text: `Best value near a bound: ${names}${rest}. A wider bound may fit better.` });
+  }
+  if (run.evaluations === 0) found.push({ kind: 'warning', text: 'No evaluation has been recorded.' });
+  else if (run.failed === run.evaluations) found.push({ kind: 'warning', text: 'Every evaluation failed.' });
+  else if (run.failed > 0) {
+    found.push({ kind: 'warning', text: `${counted(run.failed, 'evaluation')} failed (${percent(run.failed / run.evaluations, 2)}).` });
+  }
+  return [...found.filter((finding): finding is Finding => finding !== null),
+    ...run.notes.map((text): Finding => ({ kind: 'warning', text }))];
+}
+
+function tile(label: string, value: string, more?: string | null): HTMLElement {
+  return make('div', { class: 'tile' }, make('dt', {}, label), make('dd', {}, value, more ? make('small', {}, more) : null));
+}
+
+export function head(data: ReportData): HTMLElement {
+  const { run, best } = data;
+  const state = kStates[run.state] ?? kStates.failed;
+  const took = duration(run.started, run.ended);
+  const figures = data.series[0]?.figures?.best;
+  return make('div', { class: 'head', id: 'top' },
+    make('p', { class: 'kicker' }, run.taskName),
+    make('h1', {}, run.title || run.setupName || run.setup),
+    make('p', { class: `state ${state.kind}` }, make('span', { 'aria-hidden': 'true' }, `${state.mark} `), state.text),
+    make('dl', { class: 'tiles' },
+      tile('Evaluations', count(run.evaluations), run.planned === null ? null : `of ${count(run.planned)} planned`),
+      tile('Failed', count(run.failed), run.evaluations > 0 && run.failed > 0 ? percent(run.failed / run.evaluations, 2) : null),
+      best ? tile('Best aggregate', number(best.aggregate), `evaluation ${count(best.number)}`) : '',
+      figures ? tile('NSE', number(figures.nse, 3), shorten(data.series[0]!.measure, 28)) : '',
+      figures ? tile('KGE', number(figures.kge, 3), shorten(data.series[0]!.measure, 28)) : '',
+      took ? tile('Took', took) : ''),
+    make('ul', { class: 'findings' }, ...findings(data).map((finding) => make('li', { class: finding.kind }, finding.text))));
+}
+
+export function runSection(data: ReportData): Section {
+  const { run } = data;
+  const rows: [string, string | null][] = [
+    ['Task', run.taskName],
+    ['Setup file', run.setup],
+    ['Started', run.started],
+    ['Ended', run.ended],
+    ['Evaluation period', run.period ? run.period.join(' to ') : null],
+    ['Aggregation', run.aggregation],
+    ['Population', run.populationSize === null ? null : counted(run.populationSize, 'set')],
+    ['Surrogate model', run.surrogate],
+    ['Random seed', run.seed === null ? null : String(run.seed)],
+    ['Report made', run.reportMade],
+    ['Program', data.program],
+  ];
+  const facts = make('dl', { class: 'facts' });
+  for (const [name, value] of rows) if (value) facts.append(make('dt', {}, name), make('dd', {}, value));
+  return { id: 'run', title: 'Run', content: [facts] };
+}
+
+// Where the start and the best value lie between the bounds, on the scale of the search.
+function rangeBar(parameter: Parameter): Node | string {
+  const best = placeBetweenBounds(parameter, parameter.best);
+  const start = placeBetweenBounds(parameter, parameter.start);
+  if (best === null && start === null) return '';
+  const label = `start at ${percent(start, 2)}, best at ${percent(best, 2)} of the way from the lower to the upper bound`;
+  const mark = (kind: string, place: number | null) =>
+    place === null ? null : make('i', { class: kind, style: `left: ${Math.min(100, Math.max(0, place * 100)).toFixed(2)}%` });
+  return make('span', { class: 'range', role: 'img', 'aria-label': label, title: label }, mark('start', start), mark('best', best));
+}
+
+function parameterRow(parameter: Parameter): (Node | string | null)[] {
+  const traits = [parameter.kind === 'variable' ? null : parameter.kind, parameter.transformation === 'logarithmic' ? 'logarithmic' : null,
+    parameter.integer ? 'integer' : null, parameter.equation ? `= ${parameter.equation}` : null].filter(Boolean).join(', ');
+  return [
+    make('span', {}, parameter.name, parameter.comment ? make('small', {}, parameter.comment) : null),
+    number(parameter.lower, 10), number(parameter.upper, 10), number(parameter.start, 6), number(parameter.best, 10),
+    rangeBar(parameter),
+    parameter.nearBound ? make('span', { class: 'flag' }, `near ${parameter.nearBound} bound`) : traits,
+  ];
+}
+
+export function parameterSection(data: ReportData): Section | null {
+  if (data.parameters.length === 0) return null;
+  const columns = [{ title: 'Parameter' }, { title: 'Lower', number: true }, { title: 'Upper', number: true },
+    { title: 'Start', number: true }, { title: 'Best', number: true },
+    { title: 'Between the bounds', hint: 'hollow: start, filled: best, on the scale of the search' }, { title: '' }];
+  return {
+    id: 'parameters',
+    title: 'Parameters',
+    content: [table(columns, data.parameters.map(parameterRow), 'Parameters'),
+      make('p', { class: 'note' }, 'Between the bounds: hollow mark start, filled mark best, on the scale of the search.')],
+  };
+}
+
+function change(initial: number | null, best: number | null): string {
+  return initial === null || best === null || initial === 0 ? kMissing : percent((best - initial) / Math.abs(initial));
+}
+
+export function resultSection(data: ReportData): Section | null {
+  const content: Node[] = [];
+  const values = [{ title: data.initialLabel === 'first evaluation' ? 'First' : 'Initial', number: true }, { title: 'Best', number: true },
+    { title: 'Change', number: true }];
+  if (data.objectives.length > 0) {
+    content.push(heading('Objective functions'), table([{ title: 'Objective function' }, ...values],
+      data.objectives.map(({ name, initial, best }) => [name, number(initial, 6), number(best, 6), change(initial, best)]), 'Objective functions'));
+  }
+  if (data.measures.length > 0) {
+    content.push(heading('Output measures'), table(
+      [{ title: 'Output measure' }, { title: 'Statistic' }, { title: 'Objective function' }, { title: 'Weight', number: true }, ...values],
+      data.measures.map(({ name, statistic, objective, weight, initial, best }) =>
+        [name, statistic, objective ?? kMissing, number(weight), number(initial, 6), number(best, 6), change(initial, best)]),
+      'Output measures'));
+  }
+  const ranking = rankingTable(data);
+  if (ranking) content.push(heading('Best evaluations'), ranking);
+  return content.length > 0 ? { id: 'results', title: 'Objectives and measures', content } : null;
+}
+
+function rankingTable(data: ReportData): HTMLElement | null {
+  const { evaluations } = data;
+  const first = bestShare(evaluations.aggregate, 0).slice(0, 10);
+  if (first.length < 2 || data.run.task === 'sensitivity') return null;
+  const variable = variableParameters(data);
+  return table([{ title: 'Evaluation' }, { title: 'Aggregate', number: true },
+    ...variable.map((parameter) => ({ title: shorten(parameter.name, 24), hint: parameter.name, number: true }))],
+  first.map((place) => [count(evaluations.numbers[place]!), number(evaluations.aggregate[place], 6),
+    ...variable.map((_, index) => number(evaluations.parameters[index]?.[place], 5))]), 'Best evaluations');
+}
+
+export function failureSection(data: ReportData): Section | null {
+  if (data.failures.length === 0) return null;
+  return {
+    id: 'failures',
+    title: 'Failures',
+    content: [
+      paragraph(`${counted(data.run.failed, 'evaluation')} failed, for ${counted(data.failures.length, 'reason')}.`),
+      table([{ title: 'Reason' }, { title: 'Evaluations', number: true }, { title: 'Example' }],
+        data.failures.map(({ reason, count: times, example }) => [reason, count(times), example ?? '']), 'Failures'),
+    ],
+  };
+}
+
+export function summarySection(data: ReportData): Section | null {
+  if (data.summary.length === 0) return null;
+  return { id: 'summary', title: 'Closing report', content: [make('pre', { tabindex: 0 }, data.summary.join('\n'))] };
+}

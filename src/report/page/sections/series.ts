@@ -1,0 +1,244 @@
+// Simulated against observed series: how well it fits, when it does not, and over which range of values.
+import { axis, chart, legend, timeZoom, tip, tooltip, type ChartPlan } from '../chart';
+import { timesOf, type Figures, type Maybe, type ReportData, type Series } from '../data';
+import { shorten, table } from '../dom';
+import { count, moment, number } from '../format';
+import type { Look } from '../look';
+import { durationCurve, finite, spaced, thin } from '../numbers';
+import { grid, heading, type Section } from './section';
+
+const kCurvePoints = 700;
+
+interface Simulated {
+  key: 'initial' | 'best';
+  name: string;
+  values: Maybe[];
+}
+
+function simulations(data: ReportData, series: Series): Simulated[] {
+  const number = series.bestNumber ?? data.best?.number;
+  return [
+    { key: 'initial' as const, name: data.initialLabel ?? 'initial parameters', values: series.initial ?? [] },
+    { key: 'best' as const, name: number == null ? 'best' : `best (evaluation ${count(number)})`, values: series.best ?? [] },
+  ].filter(({ values }) => finite(values).length > 0);
+}
+
+const unitOf = (series: { measure: string; unit?: string | null }) => series.unit || 'Value';
+const onLog = (values: Maybe[], log: boolean) => (log ? values.map((value) => (value !== null && value > 0 ? value : null)) : values);
+const lineStyles = (look: Look) => ({
+  initial: { color: look.initial, width: 1.2, type: 'dashed' as const },
+  best: { color: look.best, width: 2.2 },
+  observed: { color: look.observed, width: 1 },
+});
+
+/** Names that fit a small chart. */
+const short = (simulated: Simulated[]) => simulated.map((one) => ({ ...one, name: one.key }));
+
+function outside(times: number[], period: Series['period']): [number, number][] {
+  const [first, last] = [times[0], times[times.length - 1]];
+  if (!period || first === undefined || last === undefined) return [];
+  return ([[first, period[0]], [period[1], last]] as [number, number][]).filter(([from, to]) => to > from);
+}
+
+// Areas outside the evaluation period, where nothing is judged.
+function outsidePeriod(look: Look, times: number[], period: Series['period']): object {
+  const areas = outside(times, period);
+  return areas.length === 0 ? {} : { markArea: { silent: true, itemStyle: { color: look.rule, opacity: 0.45 }, data: areas.map(([from, to]) => [{ xAxis: from }, { xAxis: to }]) } };
+}
+
+function hydrographPlan(data: ReportData, series: Series): ChartPlan {
+  const times = timesOf(series, series.observed.length);
+  const simulated = simulations(data, series);
+  const judged = simulated.find(({ key }) => key === 'best') ?? simulated[0];
+  const residuals = judged?.values.map((value, place) => {
+    const observed = series.observed[place] ?? null;
+    return value === null || observed === null ? null : value - observed;
+  });
+  const step = times.length > 1 ? times[1]! - times[0]! : 86400000;
+  return {
+    title: 'Simulated and observed, and the residuals',
+    note: `Residual: ${judged ? shorten(judged.name, 60) : 'simulated'} less observed.${outside(times, series.period).length > 0 ? ' Shaded: outside the evaluation period.' : ''} ${series.thinned ? ' Of so many times the extremes of short spans are drawn.' : ''} Drag across the chart to zoom in, move the slider below to go along.`,
+    height: 492,
+    zoom: 'x',
+    switches: [{ key: 'log', label: 'Log' }],
+    option: (look, is) => {
+      const style = lineStyles(look);
+      const line = (name: string, column: string, lineStyle: { color: string }, more: object = {}) => ({
+        name, type: 'line', symbol: 'none', sampling: 'lttb', lineStyle, color: lineStyle.color, connectNulls: false,
+        encode: { x: 'time', y: column }, ...more,
+      });
+      const source: Record<string, (Maybe | number)[]> = { time: times, observed: onLog(series.observed, is('log')), residual: residuals ?? [] };
+      for (const { key, values } of simulated) source[key] = onLog(values, is('log'));
+      return {
+        dataset: { source, dimensions: ['time', ...Object.keys(source).filter((key) => key !== 'time')] },
+        legend: legend(look, { data: ['observed', ...simulated.map(({ name }) => name)] }),
+        axisPointer: { link: [{ xAxisIndex: 'all' }], lineStyle: { color: look.muted } },
+        grid: [{ left: 64, right: 16, top: 36, height: 262, outerBoundsMode: 'none' }, { left: 64, right: 16, top: 338, height: 86, outerBoundsMode: 'none' }],
+        xAxis: [
+          axis(look, { type: 'time', min: times[0], max: times[times.length - 1], axisLabel: { show: false }, axisTick: { show: false } }),
+          axis(look, { type: 'time', gridIndex: 1, min: times[0], max: times[times.length - 1], axisLine: { onZero: false } }),
+        ],
+        yAxis: [
+          axis(look, { name: unitOf(series), log: is('log'), nameGap: 48, ...(is('log') ? {} : { scale: false }) }),
+          axis(look, { name: 'Residual', gridIndex: 1, nameGap: 48, splitNumber: 2, scale: false }),
+        ],
+        dataZoom: timeZoom(look, [0, 1], 'filter', (time) => moment(time, step)),
+        tooltip: tooltip(look, {
+          trigger: 'axis',
+          formatter: (points: { seriesName: string; dataIndex: number }[]) => {
+            const place = points[0]!.dataIndex;
+            return tip(moment(times[place]!, step), [
+              ['observed', number(series.observed[place])],
+              ...simulated.map(({ name, values }): [string, string] => [shorten(name, 40), number(values[place])]),
+              ['residual', number(residuals?.[place])],
+            ]);
+          },
+        }),
+        series: [
+          ...simulated.map(({ key, name }) => line(name, key, style[key], { z: key === 'best' ? 3 : 2 })),
+          line('observed', 'observed', style.observed, { z: 4, ...outsidePeriod(look, times, series.period) }),
+          ...(residuals ? [line('residual', 'residual', { color: look.best }, { xAxisIndex: 1, yAxisIndex: 1, lineStyle: { color: look.best, width: 1 }, areaStyle: { color: look.best, opacity: 0.2 } })] : []),
+        ],
+      };
+    },
+    values: () => ({
+      columns: [{ title: 'Time' }, { title: 'observed', number: true }, ...simulated.map(({ name }) => ({ title: name, number: true })),
+        { title: 'residual', number: true }],
+      length: times.length,
+      row: (place) => [moment(times[place]!, step), number(series.observed[place]), ...simulated.map(({ values }) => number(values[place])),
+        number(residuals?.[place])],
+    }),
+  };
+}
+
+/** Places in the evaluation period with an observed value: those by which a simulation is judged. */
+function judgedPlaces(series: Series): number[] {
+  const times = timesOf(series, series.observed.length);
+  const [from, to] = series.period ?? [-Infinity, Infinity];
+  return series.observed.flatMap((value, place) => (value !== null && times[place]! >= from && times[place]! <= to ? [place] : []));
+}
+
+function scatterPlan(data: ReportData, series: Series): ChartPlan {
+  const places = judgedPlaces(series);
+  const times = timesOf(series, series.observed.length);
+  const observed = places.map((place) => series.observed[place] ?? null);
+  const simulated = short(simulations(data, series));
+  return {
+    title: 'Simulated against observed',
+    height: 340,
+    small: true,
+    zoom: 'xy',
+    switches: [{ key: 'log', label: 'Log' }],
+    option: (look, is) => {
+      const scaled = (values: Maybe[]) => onLog(values, is('log')).map((value) => (value !== null && is('log') ? Math.log(value) : value));
+      const dots = simulated.map(({ key, name, values }) => {
+        const column = places.map((place) => values[place] ?? null);
+        const drawn = thin(scaled(observed), scaled(column), 240, 200);
+        return { key, name, data: drawn.map((at) => [observed[at]!, column[at]!, places[at]!]) };
+      });
+      const all = dots.flatMap(({ data: points }) => points.flatMap(([x, y]) => [x!, y!]));
+      const low = all.reduce((least, value) => Math.min(least, value), Infinity);
+      const high = all.reduce((most, value) => Math.max(most, value), -Infinity);
+      const both = { log: is('log'), min: low, max: high, splitNumber: 4, axisLabel: { showMinLabel: false, showMaxLabel: false } };
+      return {
+        legend: legend(look, { data: dots.map(({ name }) => name), selected: dots.length > 1 ? { [dots[0]!.name]: false } : {} }),
+        grid: { left: 26, right: 16, top: 36, bottom: 28 },
+        xAxis: axis(look, { ...both, name: 'Observed', nameGap: 26 }),
+        yAxis: axis(look, { ...both, name: 'Simulated', nameGap: 44 }),
+        tooltip: tooltip(look, { formatter: (point: { value?: number[]; seriesName: string }) => (point.value && point.value.length > 2
+          ? tip(moment(times[point.value[2]!]!), [['observed', number(point.value[0])], [shorten(point.seriesName, 40), number(point.value[1])]])
+          : '') }),
+        series: [
+          ...dots.map(({ key, name, data: points }) => ({
+            name, type: 'scatter', data: points, symbolSize: 4, symbol: key === 'initial' ? 'rect' : 'circle',
+            itemStyle: { color: key === 'initial' ? look.initial : look.best, opacity: 0.45 },
+          })),
+          { name: '1:1', type: 'line', symbol: 'none', silent: true, data: Number.isFinite(low) ? [[low, low], [high, high]] : [],
+            lineStyle: { color: look.ink, width: 1.2, type: 'dashed' } },
+        ],
+      };
+    },
+  };
+}
+
+// Of a thinned series the curve of all its values comes with the data.
+function givenCurve({ flowDuration }: Series, key: 'observed' | 'initial' | 'best'): [number, number][] | null {
+  const values = flowDuration?.[key];
+  if (!values) return null;
+  return flowDuration!.exceedance.flatMap((share, index): [number, number][] => (values[index] == null ? [] : [[share, values[index]!]]));
+}
+
+function durationPlan(data: ReportData, series: Series): ChartPlan {
+  const places = judgedPlaces(series);
+  const curves = [
+    ...short(simulations(data, series)),
+    { key: 'observed' as const, name: 'observed', values: series.observed },
+  ].map((curve) => {
+    const points = givenCurve(series, curve.key) ?? durationCurve(places.map((place) => curve.values[place] ?? null));
+    return { ...curve, points: spaced(points.length, kCurvePoints).map((index) => points[index]!) };
+  });
+  const positive = curves.every(({ points }) => points.some(([, value]) => value > 0));
+  return {
+    title: 'Duration curve',
+    height: 340,
+    small: true,
+    zoom: 'xy',
+    switches: positive ? [{ key: 'log', label: 'Log', on: true }] : [],
+    option: (look, is) => ({
+      legend: legend(look),
+      grid: { left: 26, right: 16, top: 36, bottom: 28 },
+      xAxis: axis(look, { name: 'Time exceeded (%)', min: 0, max: 100, nameGap: 26 }),
+      yAxis: axis(look, { name: unitOf(series), log: is('log'), nameGap: 44 }),
+      tooltip: tooltip(look, { trigger: 'axis', formatter: (points: { seriesName: string; value: number[] }[]) =>
+        tip(`Exceeded ${number(points[0]!.value[0], 3)} % of the time`, points.map((point) => [shorten(point.seriesName, 40), number(point.value[1])])) }),
+      series: curves.map(({ key, name, points }) => ({
+        name, type: 'line', symbol: 'none', lineStyle: { ...lineStyles(look)[key], width: 1.8 }, color: lineStyles(look)[key].color,
+        data: is('log') ? points.filter(([, value]) => value > 0) : points,
+      })),
+    }),
+    values: () => ({
+      columns: [{ title: 'Time exceeded (%)', number: true }, ...curves.map(({ name }) => ({ title: name, number: true }))],
+      length: Math.max(...curves.map(({ points }) => points.length)),
+      row: (index) => [number(curves[curves.length - 1]!.points[index]?.[0]), ...curves.map(({ points }) => number(points[index]?.[1]))],
+    }),
+  };
+}
+
+const kFigures: [keyof Figures, string, string][] = [
+  ['nse', 'NSE', 'Nash-Sutcliffe efficiency; 1 is perfect, 0 as good as the mean'],
+  ['kge', 'KGE', 'Kling-Gupta efficiency (2009); 1 is perfect'],
+  ['kgeR', 'KGE: r', 'linear correlation; 1 is perfect'],
+  ['kgeAlpha', 'KGE: \u03b1', 'ratio of the standard deviations, simulated to observed; 1 is perfect'],
+  ['kgeBeta', 'KGE: \u03b2', 'ratio of the means, simulated to observed; 1 is perfect'],
+  ['pbias', 'Bias (%)', '100 \u00b7 (sum of simulated less sum of observed) / sum of observed; 0 is perfect'],
+  ['rmse', 'RMSE', 'root mean square error, in the unit of the series; 0 is perfect'],
+  ['r2', 'r\u00b2', 'coefficient of determination of the linear regression; 1 is perfect'],
+  ['n', 'Values', 'compared values in the evaluation period'],
+];
+
+function figuresTable(data: ReportData, series: Series): HTMLElement | null {
+  const rows: [string, Figures][] = [];
+  if (series.figures?.initial) rows.push([data.initialLabel ?? 'initial parameters', series.figures.initial]);
+  if (series.figures?.best) rows.push(['best', series.figures.best]);
+  if (rows.length === 0) return null;
+  return table([{ title: 'Evaluation period' }, ...kFigures.map(([, title, hint]) => ({ title, hint, number: true }))],
+    rows.map(([name, figures]) => [name, ...kFigures.map(([key]) => (key === 'n' ? number(figures.n, 9) : number(figures[key])))]),
+    `Figures of ${series.measure}`);
+}
+
+export function seriesSection(data: ReportData): Section | null {
+  const shown = data.series.filter((series) => simulations(data, series).length > 0 || finite(series.observed).length > 0);
+  if (shown.length === 0) return null;
+  return {
+    id: 'series',
+    title: 'Series',
+    content: shown.flatMap((series) => [
+      heading(series.measure),
+      figuresTable(data, series),
+      chart(hydrographPlan(data, series)),
+      ...(judgedPlaces(series).length > 0 && simulations(data, series).length > 0
+        ? [grid(chart(scatterPlan(data, series)), chart(durationPlan(data, series)))] : []),
+    ]),
+  };
+}
+

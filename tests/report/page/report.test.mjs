@@ -1,0 +1,156 @@
+// The report in a real browser: it shows what the data hold, complains of nothing and reads no name as HTML.
+import assert from 'node:assert/strict';
+import { after, before, test } from 'node:test';
+import { openBrowser } from './browser.mjs';
+import * as sample from './sample_data.mjs';
+
+let browser;
+before(async () => { browser = await openBrowser(); });
+after(() => browser.close());
+
+async function withReport(data, more, check) {
+  const { page, complaints } = await browser.openReport(data, more);
+  try {
+    await check(page);
+    assert.deepEqual(complaints, []);
+  } finally {
+    await page.context().close();
+  }
+}
+
+/** Titles of the charts that are not drawn: without a canvas, or with one of a single colour. */
+const blankCharts = (page) => page.$$eval('figure', (figures) => figures.filter((figure) => {
+  const canvas = figure.querySelector('canvas');
+  if (!figure.dataset.drawn || !canvas) return true;
+  const copy = new OffscreenCanvas(canvas.width, canvas.height).getContext('2d', { willReadFrequently: true });
+  copy.drawImage(canvas, 0, 0);
+  const pixels = new Uint32Array(copy.getImageData(0, 0, canvas.width, canvas.height).data.buffer);
+  return new Set(pixels).size < 10;
+}).map((figure) => figure.querySelector('figcaption').textContent));
+
+const sectionsOf = (page) => page.$$eval('main > section', (found) => found.map(({ id }) => id));
+const zoomOf = (page, figure) => page.evaluate((element) => window.drawnOptions(element).dataZoom.map(({ start, end }) => [start, end])[0], figure);
+
+const kOptimisation = ['series', 'parameters', 'results', 'progress', 'dotty', 'good-sets', 'failures', 'run', 'summary'];
+/** Names are text wherever they stand, tables that open later and tooltips included. */
+async function checkHostile(page) {
+  const shown = await page.evaluate(() => document.getElementById('report').textContent);
+  for (const text of sample.kHostile) assert.ok(shown.includes(text), text);
+  for (const figure of (await page.$$('figure')).slice(-4)) {
+    await figure.scrollIntoViewIfNeeded();
+    await (await figure.$('.canvas')).hover({ position: { x: 180, y: 60 } });
+  }
+  await page.$$eval('details', (all) => all.forEach((details) => { details.open = true; }));
+  assert.equal(await page.locator('#report :is(script, img, svg, iframe)').count(), 0);
+  assert.equal(await page.evaluate(() => window.harm), undefined);
+}
+
+const cases = {
+  'a search': [sample.optimisation(), 6 + 2 + 3 + 2, kOptimisation],
+  'a search by few evaluations with two series': [sample.optimisation({ count: 12, measures: 2, days: 40, algorithm: 'DDS' }), 6 + 1 + 6 + 2,
+    kOptimisation.filter((id) => id !== 'failures')],
+  'an uncertainty analysis': [sample.uncertainty(), 1 + 1 + 9 + 6, ['band', 'parameters', 'results', 'progress', 'distributions', 'dotty', 'run', 'summary']],
+  'a sensitivity analysis': [sample.sensitivity(), 4, ['sensitivity', 'parameters', 'results', 'run', 'summary']],
+  'scenario runs': [sample.scenarios(), 3 + 1 + 6, ['series', 'parameters', 'results', 'progress', 'dotty', 'run', 'summary']],
+  'a run without an evaluation': [sample.empty(), 0, ['run']],
+  'a run whose evaluations all failed': [sample.allFailed(), 0, ['parameters', 'results', 'failures', 'run', 'summary']],
+  'a search with hostile names': [sample.hostile(sample.optimisation()), 6 + 2 + 3 + 2, kOptimisation, true],
+  'an uncertainty analysis with hostile names': [sample.hostile(sample.uncertainty()), 17, null, true],
+  'a sensitivity analysis with hostile names': [sample.hostile(sample.sensitivity()), 4, null, true],
+};
+
+for (const [name, [data, charts, expected, text]] of Object.entries(cases)) {
+  test(`${name}: every chart drawn, wide and narrow, light and dark`, async () => {
+    await withReport(data, { colorScheme: 'light' }, async (page) => {
+      assert.equal(await page.locator('.broken').count(), 0);
+      assert.equal(await page.locator('figure').count(), charts);
+      if (expected) assert.deepEqual(await sectionsOf(page), expected);
+      for (const width of [1280, 400]) {
+        await page.setViewportSize({ width, height: 900 });
+        await page.evaluate(() => new Promise((painted) => { requestAnimationFrame(() => requestAnimationFrame(painted)); }));
+        assert.deepEqual(await blankCharts(page), []);
+        assert.equal(await page.evaluate(() => document.documentElement.scrollWidth), width, 'nothing reaches out of the window');
+        await page.emulateMedia({ colorScheme: 'dark' });
+      }
+      if (text) await checkHostile(page);
+    });
+  });
+}
+
+test('a chart zooms by dragging and by the wheel, is reset, and changes to a logarithmic axis', async () => {
+  await withReport(sample.optimisation(), {}, async (page) => {
+    for (const section of ['#series', '#progress', '#dotty']) {
+      const figure = await page.$(`${section} figure`);
+      await figure.scrollIntoViewIfNeeded();
+      const canvas = await figure.$('.canvas');
+      const { x, y, width } = await canvas.boundingBox();
+      const drag = async () => {
+        await page.mouse.move(x + 0.4 * width, y + 60);
+        await page.mouse.down();
+        await page.mouse.move(x + 0.5 * width, y + 100, { steps: 4 });
+        await page.mouse.move(x + 0.6 * width, y + 140, { steps: 4 });
+        await page.mouse.up();
+      };
+      const zoomed = ([start, end]) => start > 0 && end < 100 && end > start;
+      assert.deepEqual(await zoomOf(page, figure), [0, 100]);
+      await drag();
+      assert.ok(zoomed(await zoomOf(page, figure)), `${section} by dragging: ${await zoomOf(page, figure)}`);
+      await figure.$eval('.reset', (button) => button.click());
+      assert.deepEqual(await zoomOf(page, figure), [0, 100], section);
+      await page.mouse.move(x + 0.5 * width, y + 100);
+      await page.keyboard.down('Control');
+      await page.mouse.wheel(0, -300);
+      await page.keyboard.up('Control');
+      await page.waitForFunction((element) => window.drawnOptions(element).dataZoom[0].start > 0, figure);
+    }
+    const figure = await page.$('#series figure');
+    await (await figure.$('button[aria-pressed]')).click();
+    assert.equal(await page.evaluate((element) => window.drawnOptions(element).yAxis[0].type, figure), 'log');
+    assert.deepEqual(await blankCharts(page), []);
+  });
+});
+
+test('the reader changes what dots are drawn against, and between light and dark', async () => {
+  await withReport(sample.optimisation({ count: 200 }), { colorScheme: 'light' }, async (page) => {
+    const ground = () => page.evaluate(() => getComputedStyle(document.body).backgroundColor);
+    const light = await ground();
+    await page.locator('nav button').click();
+    assert.notEqual(await ground(), light);
+    await page.locator('#dotty select').selectOption({ index: 2 });
+    assert.deepEqual(await blankCharts(page), []);
+  });
+});
+
+test('a print has every chart, in light colours, and leaves the screen as it was', async () => {
+  await withReport(sample.optimisation(), { colorScheme: 'dark' }, async (page) => {
+    await page.evaluate(() => dispatchEvent(new Event('beforeprint')));
+    assert.equal(await page.locator('figure canvas.picture').count(), 13);
+    assert.deepEqual(await blankCharts(page), []);
+    assert.equal(await page.evaluate(() => document.documentElement.dataset.theme), 'light');
+    await page.evaluate(() => dispatchEvent(new Event('afterprint')));
+    const pdf = await page.pdf({ preferCSSPageSize: true, printBackground: true });
+    assert.ok(pdf.length > 100000);
+    assert.equal(await page.locator('figure canvas.picture').count(), 0);
+    assert.equal(await page.evaluate(() => document.documentElement.dataset.theme), 'dark');
+    assert.deepEqual(await blankCharts(page), []);
+  });
+});
+
+test('20 000 evaluations and 20 years of days are drawn thinned and counted in full', async (context) => {
+  await withReport(sample.optimisation({ count: 20000, days: 7305 }), {}, async (page) => {
+    const [drawn, size] = await page.evaluate(() => [document.documentElement.dataset.drawn, document.documentElement.outerHTML.length]);
+    context.diagnostic(`every chart drawn ${drawn} ms after the page was opened; ${(size / 1e6).toFixed(1)} million characters`);
+    assert.deepEqual(await blankCharts(page), []);
+    assert.match(await page.locator('.tiles').textContent(), /20\u202f000/);
+    await page.locator('#progress figure summary').first().click();
+    await page.getByText('200 of 20\u202f000 rows').waitFor();
+    const dots = await page.evaluate(() => window.drawnOptions(document.querySelector('#dotty figure')).series[0].data.length);
+    assert.ok(dots > 500 && dots < 18000, `${dots} dots`);
+  });
+});
+
+test('data of another format are refused in words', async () => {
+  const { page } = await browser.openReport({ ...sample.empty(), format: 2 });
+  assert.match(await page.locator('.broken').textContent(), /format 2; this page reads format 1/);
+  await page.context().close();
+});
