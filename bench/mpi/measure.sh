@@ -1,7 +1,6 @@
 #!/usr/bin/env bash
 # Measures MPI jobs of the built program on this machine, whose ranks all share its cores; the model sleeps, so that many
-# fit. Needs mpirun and the targets Mirevo and test_model. The figures in docs/clusters.md
-# come from here.
+# fit. Needs mpirun and the target mpi_job_folder. The figures in docs/clusters.md come from here.
 #
 #   bench/mpi/measure.sh [build folder] [another Mirevo to compare the start-up with]
 set -euo pipefail
@@ -13,113 +12,20 @@ trap 'rm -rf "$work"' EXIT
 cd "$work"
 export OMPI_MCA_btl=self,vader OMPI_MCA_btl_vader_single_copy_mechanism=none
 
-mkdir model
-printf '#!/bin/sh\nexec %s --steps 10 "$@"\n' "$build/test_model" >model/run.sh
-chmod +x model/run.sh
-printf 'a = 5\nb = 2\nc = 1\n' >model/parameters.txt
-printf '!\na = !a              !\nb = !b              !\n' >model/parameters.tpl
-(cd model && ./run.sh && cp simulated.csv ../observed.csv)
+# As many model runs as the first argument, each sleeping as many milliseconds as the second.
+write_setup() { "$build/mpi_job_folder" "$work" "$1" "$2"; }
 
-parameter() { # number name upper
-  printf '[PARAMETER_%d]\nInitial_Value=1.0\nLower_Bound=0.0\nUpper_Bound=%s\nTransformation_Type=0\nParameter_Type=0\n' "$1" "$3"
-  printf "Parameter_IDValue=%d.5E-035\nParameter_Name='%s'\nParameter_Equation=''\nComment=''\n[Keywords]\n[/Keywords]\n[/PARAMETER_%d]\n" "$1" "$2" "$1"
-}
-
-# Writes job.kdx: as many model runs as the first argument, each sleeping as many milliseconds as the second.
-write_setup() {
-  {
-    echo "[MIREVO_PARAMETERS]
-[MIREVO_SIMULATION_OPTION]
-Option=0
-Title='MPI'
-[SIMBATCH]
-TqSEKdxListItemCount=1
-[SIMBATCHITEM_1]
-BatchFileName='model/run.sh'
-Arguments='--sleep-ms $2'
-[/SIMBATCHITEM_1]
-[/SIMBATCH]
-[SIMPARAM]
-TqSEKdxListItemCount=1
-[SIMPARAMITEM_1]
-FileType=0
-ParamFileName='model/parameters.txt'
-TemplateFileName='model/parameters.tpl'
-[/SIMPARAMITEM_1]
-[/SIMPARAM]
-[/MIREVO_SIMULATION_OPTION]
-[MODEL_PARAMETERS]
-TqSEKdxListItemCount=2"
-    parameter 1 a 10.0
-    parameter 2 b 5.0
-    echo "[INTERNAL_CONSTRAINTS]
-TqSEKdxListItemCount=0
-[/INTERNAL_CONSTRAINTS]
-[/MODEL_PARAMETERS]
-[ObjectiveFunctions]
-Start_Date=2001-01-01
-End_Date=2001-12-31
-Aggregation_Method=0
-[OUTPUT_MEASURES]
-TqSEKdxListItemCount=1
-[MEASURE_1]
-Name='flow'
-Interface_Type=0
-Statistic_Type=1
-Weight=1.0
-Weight_Above=1.0
-Function_Name='fit'
-[SIMULATION_FILE]
-File_Name='model/simulated.csv'
-Item_No=1
-[/SIMULATION_FILE]
-[OBSERVATION_FILE]
-File_Name='observed.csv'
-Item_No=1
-[/OBSERVATION_FILE]
-[/MEASURE_1]
-[OUTPUT_MEASURE_FILE]
-File_Name=''
-[/OUTPUT_MEASURE_FILE]
-[/OUTPUT_MEASURES]
-[OBJECTIVE_FUNCTIONS]
-TqSEKdxListItemCount=1
-[OBJECTIVE_1]
-Name='fit'
-Function_Type=0
-Weight=1.0
-[/OBJECTIVE_1]
-[/OBJECTIVE_FUNCTIONS]
-[/ObjectiveFunctions]
-[SAVE_OUTPUT_FILES]
-TqSEKdxListItemCount=0
-[/SAVE_OUTPUT_FILES]
-[SCENARIOS]
-Scenario_Type=1
-[SCENARIO_RUNS]
-TqSEKdxListItemCount=$1"
-    for ((i = 1; i <= $1; ++i)); do printf '[SCENARIO_%d]\nParameters=%d.%d,1.0\n[/SCENARIO_%d]\n' $i $((i % 10)) $((i % 7)) $i; done
-    echo "[/SCENARIO_RUNS]
-[/SCENARIOS]
-[SimultaneousSimulations]
-NoSimultaneousSim=1
-UseSingleThread=0
-[/SimultaneousSimulations]
-[/MIREVO_PARAMETERS]"
-  } >job.kdx
-}
-
-job() { mpirun --oversubscribe --allow-run-as-root --bind-to none -n "$1" "$build/Mirevo" job.kdx; }
+job() { mpirun --oversubscribe --allow-run-as-root --bind-to none -n "$1" "$build/Mirevo" basin.kdx; }
 
 # Seconds from the first row of the result file to the last one, and the number of rows between them: the job's start is
 # left out. The file is looked at every 10 ms.
 evaluation_rate() { # ranks
-  rm -f job*.dat
+  rm -f basin*.dat
   job "$1" &
   local first='' last='' first_rows=0 last_rows=0 rows=0 seen=0 now
   while kill -0 $! 2>/dev/null; do
-    if [ -e job.dat ]; then
-      rows=$(grep -c OK job.dat || true)
+    if [ -e basin.dat ]; then
+      rows=$(grep -c OK basin.dat || true)
       now=$EPOCHREALTIME
       if [ "$rows" -gt "$seen" ]; then
         [ -n "$first" ] || { first=$now; first_rows=$rows; }

@@ -27,6 +27,7 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
   if (!leftBehind.empty()) {
     observer_.warning(withNumber("Evaluation of parameter set No. %: ", result.number).append(leftBehind));
   }
+  warnOfUnusedObservations(result);
   for (const std::string& text : result.warnings) {
     observer_.warning(withNumber("Evaluation of parameter set No. %: ", result.number) + text);
   }
@@ -41,6 +42,15 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
   if (!result.ok()) failedRuns_.countFailure(result.number, *result.failure);
   results_[place] = std::move(result);
   ++finishedCount_;
+}
+
+void EvaluationLedger::warnOfUnusedObservations(const EvaluationResult& result) {
+  for (const UnusedObservations& unused : result.unusedObservations) {
+    const auto [fewest, isFirst] = fewestUsed_.try_emplace(unused.measure, unused.usedCount);
+    if (!isFirst && fewest->second <= unused.usedCount) continue;
+    fewest->second = unused.usedCount;
+    observer_.warning(withNumber("Evaluation of parameter set No. %: ", result.number) + unused.text);
+  }
 }
 
 std::vector<EvaluationResult> EvaluationLedger::end() {

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <map>
 #include <optional>
 #include <span>
 #include <string_view>
@@ -38,13 +39,17 @@ class EvaluationLedger final {
   std::vector<EvaluationResult> end();
 
  private:
+  /// A warning for each measure that a run judged by fewer observations than any run before it.
+  void warnOfUnusedObservations(const EvaluationResult& result);
+
   EvaluationObserver& observer_;
   FailedRunPolicy& failedRuns_;
   std::span<const ParameterSet> sets_;
   std::vector<EvaluationResult> results_;
-  std::size_t next_ = 0;           ///< first set that was not taken
-  std::size_t finishedCount_ = 0;  ///< sets that have a result
-  int evaluationCount_ = 0;        ///< sets of the batches before this one
+  std::size_t next_ = 0;                           ///< first set that was not taken
+  std::size_t finishedCount_ = 0;                  ///< sets that have a result
+  int evaluationCount_ = 0;                        ///< sets of the batches before this one
+  std::map<std::size_t, std::size_t> fewestUsed_;  ///< observations that a warning was given for, by measure
 };
 
 /// Evaluator::settleAggregates() of the evaluators that run models.

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <optional>
 #include <string>
@@ -28,6 +29,13 @@ struct EvaluationFailure {
   std::vector<std::string> lastOutput;  ///< the last lines that the batch printed
 };
 
+/// A measure some of whose observations the model run has no value for; the rest of them is what was judged.
+struct UnusedObservations {
+  std::size_t measure = 0;    ///< 0-based
+  std::size_t usedCount = 0;  ///< observations that were judged
+  std::string text;           ///< what the log should say of it, one line
+};
+
 /// What one parameter set yielded.
 struct EvaluationResult {
   int number = 0;                       ///< the set's number in the run, from 1
@@ -38,6 +46,7 @@ struct EvaluationResult {
   /// series after another, NaN where the model has none. Empty for a failed evaluation.
   std::vector<double> simulatedValues;
   std::optional<EvaluationFailure> failure;
+  std::vector<UnusedObservations> unusedObservations;
   std::vector<std::string> warnings;  ///< what the log should say of the run, one line each
 
   bool ok() const { return !failure.has_value(); }

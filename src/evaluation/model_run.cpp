@@ -79,11 +79,7 @@ bool exists(const std::string& path) {
 
 ModelRunner::ModelRunner(ModelDescription description, ParameterModel& parameters, ObjectiveAggregator& aggregator,
                          ProcessLauncher& launcher, const LauncherSettings& launcherSettings)
-    : description_(std::move(description)),
-      parameters_(parameters),
-      aggregator_(aggregator),
-      launcher_(launcher),
-      fewestPairs_(description_.measures.size()) {
+    : description_(std::move(description)), parameters_(parameters), aggregator_(aggregator), launcher_(launcher) {
   requireFilesInBaseFolder();
   const std::vector<std::string> converted = readTemplates();
   series_ = SeriesTables::MirevoTSobjectInit(description_.measures, description_.period);
@@ -318,17 +314,18 @@ std::optional<EvaluationFailure> ModelRunner::readSeriesMeasure(int slot, std::s
   return std::nullopt;
 }
 
-void ModelRunner::noteUnusedObservations(std::size_t i, const MeasureStatistics& statistics, EvaluationResult& result) {
+void ModelRunner::noteUnusedObservations(std::size_t i, const MeasureStatistics& statistics,
+                                         EvaluationResult& result) const {
+  if (!statistics.firstUnused) return;
   const std::size_t pairs = statistics.simulatedValues.size();
-  std::optional<std::size_t>& fewest = fewestPairs_[i];
-  if (!statistics.firstUnused || (fewest && *fewest <= pairs)) return;
-  fewest = pairs;
   const OutputMeasure& measure = description_.measures[i];
-  result.warnings.push_back(fmt::format(
-      "output measure \"{}\": {} of {} observations in the evaluation period are not used, as item No. {} of "
-      "{} has no value at their time; the first is at {}",
-      trimTrailing(measure.name), statistics.observationCount - pairs, statistics.observationCount,
-      measure.simulation.itemNo, trimTrailing(measure.simulation.fileName), formatDate(*statistics.firstUnused)));
+  result.unusedObservations.push_back(
+      {i, pairs,
+       fmt::format(
+           "output measure \"{}\": {} of {} observations in the evaluation period are not used, as item No. {} of "
+           "{} has no value at their time; the first is at {}",
+           trimTrailing(measure.name), statistics.observationCount - pairs, statistics.observationCount,
+           measure.simulation.itemNo, trimTrailing(measure.simulation.fileName), formatDate(*statistics.firstUnused))});
 }
 
 }  // namespace mirevo

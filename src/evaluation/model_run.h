@@ -84,8 +84,7 @@ class ModelRunner final {
   /// Fills in the measure and simulated values, unless what the model wrote cannot be used.
   std::optional<EvaluationFailure> readMeasures(int slot, EvaluationResult& result);
   std::optional<EvaluationFailure> readSeriesMeasure(int slot, std::size_t measure, EvaluationResult& result);
-  /// A warning when a run meets fewer observations than any before it: the rest of them is not judged.
-  void noteUnusedObservations(std::size_t measure, const MeasureStatistics& statistics, EvaluationResult& result);
+  void noteUnusedObservations(std::size_t measure, const MeasureStatistics& statistics, EvaluationResult& result) const;
   EvaluationFailure makeFailure(EvaluationFailure::Kind kind, std::string reason, int slot) const;
 
   ModelDescription description_;
@@ -97,7 +96,6 @@ class ModelRunner final {
   SavedFiles savedFiles_;
   std::vector<ObservedSeries> observedSeries_;
   std::vector<SlotFiles> slots_;
-  std::vector<std::optional<std::size_t>> fewestPairs_;  ///< one a measure: least that a warning was given for
 };
 
 }  // namespace mirevo

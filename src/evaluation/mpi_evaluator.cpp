@@ -115,7 +115,7 @@ void beginWorkers(MessageChannel& channel, const BeginMessage& message) {
   sendToWorkers(channel, RankMessage::begin, encode(message));
 }
 
-bool stopWorkers(MessageChannel& channel, double seconds) {
+bool stopWorkers(MessageChannel& channel, double seconds, const std::function<void(const std::string&)>& warn) {
   using Clock = std::chrono::steady_clock;
   sendToWorkers(channel, RankMessage::stop, {});
   const Clock::time_point start = Clock::now();
@@ -125,6 +125,11 @@ bool stopWorkers(MessageChannel& channel, double seconds) {
     const auto message = channel.receive(left);
     if (!message) return false;
     if (message->tag == static_cast<int>(RankMessage::farewell)) ++farewells;
+    if (message->tag == static_cast<int>(RankMessage::failure)) {
+      const FailureMessage failure = decodeFailure(message->content);
+      warn(fmt::format("Worker {} met an error that no evaluation depended on: {}{}{}", message->rank, failure.message,
+                       failure.detail.empty() ? "" : "\n", failure.detail));
+    }
   }
   return true;
 }

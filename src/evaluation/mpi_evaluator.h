@@ -1,5 +1,6 @@
 #pragma once
 
+#include <functional>
 #include <optional>
 #include <vector>
 
@@ -49,7 +50,8 @@ class MpiEvaluator final : public Evaluator {
 void beginWorkers(MessageChannel& channel, const BeginMessage& message);
 
 /// Tells every worker, in rank order, to stop, and waits for their farewells. False when one has not answered within
-/// `seconds`. What else they still have to say is dropped.
-bool stopWorkers(MessageChannel& channel, double seconds);
+/// `seconds`. A worker may meet a fatal error after the last result was in, its base folder still being copied; `warn`
+/// is given a text for each. What else they still have to say is dropped.
+bool stopWorkers(MessageChannel& channel, double seconds, const std::function<void(const std::string&)>& warn);
 
 }  // namespace mirevo

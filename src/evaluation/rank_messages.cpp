@@ -2,6 +2,7 @@
 
 #include <cstdint>
 #include <cstring>
+#include <optional>
 #include <type_traits>
 #include <vector>
 
@@ -10,63 +11,138 @@
 namespace mirevo {
 namespace {
 
+/// The fields of a struct, named once for both directions: `archive` is a Writer or a Reader.
+template <class Struct>
+struct Layout;
+
+template <>
+struct Layout<BeginMessage> {
+  static void of(auto& archive, auto& message) { archive(message.setupFile, message.text); }
+};
+template <>
+struct Layout<SetMessage> {
+  static void of(auto& archive, auto& message) { archive(message.number, message.set); }
+};
+template <>
+struct Layout<ReadyMessage> {
+  static void of(auto& archive, auto& message) { archive(message.host, message.processFolder); }
+};
+template <>
+struct Layout<ResultMessage> {
+  static void of(auto& archive, auto& message) { archive(message.result, message.leftBehind); }
+};
+template <>
+struct Layout<FailureMessage> {
+  static void of(auto& archive, auto& message) { archive(message.message, message.detail); }
+};
+/// Without the number, which the master knows.
+template <>
+struct Layout<EvaluationResult> {
+  static void of(auto& archive, auto& result) {
+    archive(result.measureValues, result.objectiveValues, result.aggregate, result.simulatedValues, result.failure,
+            result.unusedObservations, result.warnings);
+  }
+};
+template <>
+struct Layout<EvaluationFailure> {
+  static void of(auto& archive, auto& failure) { archive(failure.kind, failure.reason, failure.lastOutput); }
+};
+template <>
+struct Layout<UnusedObservations> {
+  static void of(auto& archive, auto& unused) { archive(unused.measure, unused.usedCount, unused.text); }
+};
+
+template <class Value>
+constexpr bool kIsPlain = std::is_arithmetic_v<Value> || std::is_enum_v<Value>;
+
+/// Turns a message into bytes, field by field in the order in which they are given.
 class Writer final {
  public:
-  template <class Number>
-  Writer& number(Number value) {
-    static_assert(std::is_trivially_copyable_v<Number>);
-    content_.append(reinterpret_cast<const char*>(&value), sizeof value);
-    return *this;
-  }
-  Writer& text(std::string_view value) {
-    number(static_cast<std::uint64_t>(value.size()));
-    content_.append(value);
-    return *this;
-  }
-  Writer& reals(const std::vector<double>& values) {
-    number(static_cast<std::uint64_t>(values.size()));
-    content_.append(reinterpret_cast<const char*>(values.data()), values.size() * sizeof(double));
-    return *this;
-  }
-  Writer& texts(const std::vector<std::string>& values) {
-    number(static_cast<std::uint64_t>(values.size()));
-    for (const std::string& value : values) text(value);
-    return *this;
+  template <class... Fields>
+  void operator()(const Fields&... fields) {
+    (put(fields), ...);
   }
   std::string take() { return std::move(content_); }
 
  private:
+  template <class Value>
+  void put(const Value& value) {
+    if constexpr (kIsPlain<Value>) {
+      content_.append(reinterpret_cast<const char*>(&value), sizeof value);
+    } else {
+      Layout<Value>::of(*this, value);
+    }
+  }
+  void put(const std::string& text) {
+    put(static_cast<std::uint64_t>(text.size()));
+    content_.append(text);
+  }
+  template <class Item>
+  void put(const std::vector<Item>& items) {
+    put(static_cast<std::uint64_t>(items.size()));
+    for (const Item& item : items) put(item);
+  }
+  void put(const std::vector<double>& values) {
+    put(static_cast<std::uint64_t>(values.size()));
+    content_.append(reinterpret_cast<const char*>(values.data()), values.size() * sizeof(double));
+  }
+  template <class Value>
+  void put(const std::optional<Value>& value) {
+    put(value.has_value());
+    if (value) put(*value);
+  }
+
   std::string content_;
 };
 
+/// Fills a message with what a Writer made of it.
 class Reader final {
  public:
   explicit Reader(std::string_view content) : rest_(content) {}
 
-  template <class Number>
-  Number number() {
-    Number value{};
-    std::memcpy(&value, bytes(sizeof value).data(), sizeof value);
-    return value;
-  }
-  std::string text() { return std::string(bytes(number<std::uint64_t>())); }
-  std::vector<double> reals() {
-    const auto count = number<std::uint64_t>();
-    if (count > rest_.size() / sizeof(double)) refuse();
-    std::vector<double> values(count);
-    if (count > 0) std::memcpy(values.data(), bytes(count * sizeof(double)).data(), count * sizeof(double));
-    return values;
-  }
-  std::vector<std::string> texts() {
-    std::vector<std::string> values;
-    for (auto left = number<std::uint64_t>(); left > 0; --left) values.push_back(text());
-    return values;
+  template <class... Fields>
+  void operator()(Fields&... fields) {
+    (get(fields), ...);
   }
   void expectEnd() const {
     if (!rest_.empty()) refuse();
   }
 
  private:
+  template <class Value>
+  void get(Value& value) {
+    if constexpr (kIsPlain<Value>) {
+      std::memcpy(&value, bytes(sizeof value).data(), sizeof value);
+    } else {
+      Layout<Value>::of(*this, value);
+    }
+  }
+  void get(bool& value) { value = bytes(1).front() != '\0'; }
+  void get(std::string& text) { text = bytes(count()); }
+  template <class Item>
+  void get(std::vector<Item>& items) {
+    items.clear();
+    for (auto left = count(); left > 0; --left) get(items.emplace_back());  // ends with the content, whatever the count
+  }
+  void get(std::vector<double>& values) {
+    const auto size = count();
+    if (size > rest_.size() / sizeof(double)) refuse();
+    values.resize(size);
+    if (size > 0) std::memcpy(values.data(), bytes(size * sizeof(double)).data(), size * sizeof(double));
+  }
+  template <class Value>
+  void get(std::optional<Value>& value) {
+    bool hasValue = false;
+    get(hasValue);
+    value.reset();
+    if (hasValue) get(value.emplace());
+  }
+
+  std::uint64_t count() {
+    std::uint64_t value = 0;
+    get(value);
+    return value;
+  }
   std::string_view bytes(std::uint64_t count) {
     if (count > rest_.size()) refuse();
     const std::string_view taken = rest_.substr(0, count);
@@ -81,91 +157,62 @@ class Reader final {
   std::string_view rest_;
 };
 
+template <class Message>
+std::string written(const Message& message) {
+  Writer writer;
+  Layout<Message>::of(writer, message);
+  return writer.take();
+}
+
+template <class Message>
+Message read(std::string_view content) {
+  Reader reader(content);
+  Message message;
+  Layout<Message>::of(reader, message);
+  reader.expectEnd();
+  return message;
+}
+
 }  // namespace
 
 std::string encode(const BeginMessage& message) {
-  return Writer().text(message.setupFile).text(message.text).take();
+  return written(message);
 }
 
 BeginMessage decodeBegin(std::string_view content) {
-  Reader reader(content);
-  BeginMessage message;
-  message.setupFile = reader.text();
-  message.text = reader.text();
-  reader.expectEnd();
-  return message;
+  return read<BeginMessage>(content);
 }
 
 std::string encode(const SetMessage& message) {
-  return Writer().number(message.number).reals(message.set).take();
+  return written(message);
 }
 
 SetMessage decodeSet(std::string_view content) {
-  Reader reader(content);
-  SetMessage message;
-  message.number = reader.number<int>();
-  message.set = reader.reals();
-  reader.expectEnd();
-  return message;
+  return read<SetMessage>(content);
 }
 
 std::string encode(const ReadyMessage& message) {
-  return Writer().text(message.host).text(message.processFolder).take();
+  return written(message);
 }
 
 ReadyMessage decodeReady(std::string_view content) {
-  Reader reader(content);
-  ReadyMessage message;
-  message.host = reader.text();
-  message.processFolder = reader.text();
-  reader.expectEnd();
-  return message;
+  return read<ReadyMessage>(content);
 }
 
 std::string encode(const ResultMessage& message) {
-  const EvaluationResult& result = message.result;
-  Writer writer;
-  writer.reals(result.measureValues).reals(result.objectiveValues).number(result.aggregate);
-  writer.reals(result.simulatedValues);
-  writer.number(static_cast<std::uint8_t>(result.ok() ? 0 : 1));
-  if (!result.ok()) {
-    writer.number(static_cast<std::int32_t>(result.failure->kind));
-    writer.text(result.failure->reason).texts(result.failure->lastOutput);
-  }
-  return writer.texts(result.warnings).text(message.leftBehind).take();
+  return written(message);
 }
 
 ResultMessage decodeResult(std::string_view content) {
-  Reader reader(content);
-  ResultMessage message;
-  EvaluationResult& result = message.result;
-  result.measureValues = reader.reals();
-  result.objectiveValues = reader.reals();
-  result.aggregate = reader.number<double>();
-  result.simulatedValues = reader.reals();
-  if (reader.number<std::uint8_t>() != 0) {
-    EvaluationFailure& failure = result.failure.emplace();
-    failure.kind = static_cast<EvaluationFailure::Kind>(reader.number<std::int32_t>());
-    failure.reason = reader.text();
-    failure.lastOutput = reader.texts();
-  }
-  result.warnings = reader.texts();
-  message.leftBehind = reader.text();
-  reader.expectEnd();
-  return message;
+  return read<ResultMessage>(content);
 }
 
 std::string encode(const FailureMessage& message) {
-  return Writer().text(message.message).text(message.detail).take();
+  return written(message);
 }
 
 FailureMessage decodeFailure(std::string_view content) {
-  Reader reader(content);
-  FailureMessage message;
-  message.message = reader.text();
-  message.detail = reader.text();
-  reader.expectEnd();
-  return message;
+  return read<FailureMessage>(content);
 }
 
 }  // namespace mirevo

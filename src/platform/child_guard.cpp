@@ -15,7 +15,7 @@ namespace {
 
 /// The guard's whole life. Between fork and exit only async-signal-safe calls are made: the program may have threads
 /// (of its MPI library) that held a lock when it was forked.
-[[noreturn]] void guard(pid_t parent, const ProcessGroupTable& table) {
+[[noreturn]] void guard(pid_t parent, const ProcessGroupTable& table, const ProcessMark& mark) {
   // A session of its own keeps the terminal's signals away; those sent on purpose to everything of the user are
   // ignored.
   ::setsid();
@@ -33,6 +33,7 @@ namespace {
     }
   }
   table.signalAll(SIGKILL);
+  mark.endBearers();
   ::_exit(0);
 }
 
@@ -45,7 +46,7 @@ ChildGuard::~ChildGuard() {
   }
 }
 
-bool ChildGuard::start(const ProcessGroupTable& table, std::string& reason) {
+bool ChildGuard::start(const ProcessGroupTable& table, const ProcessMark& mark, std::string& reason) {
   const pid_t parent = ::getpid();
   // Blocked over the fork, so that no handler of the program ever runs in the guard.
   sigset_t all;
@@ -53,7 +54,7 @@ bool ChildGuard::start(const ProcessGroupTable& table, std::string& reason) {
   ::sigfillset(&all);
   ::sigprocmask(SIG_SETMASK, &all, &before);
   process_ = ::fork();
-  if (process_ == 0) guard(parent, table);
+  if (process_ == 0) guard(parent, table, mark);
   const int error = errno;
   ::sigprocmask(SIG_SETMASK, &before, nullptr);
   if (process_ > 0) return true;

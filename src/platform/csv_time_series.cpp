@@ -57,7 +57,7 @@ bool CsvTimeSeries::parse(std::string sourceName, std::string content) {
   content_ = std::move(content);
   std::size_t position = content_.starts_with(kByteOrderMark) ? kByteOrderMark.size() : 0;
   if (readPreamble(position) && readRows(position)) return true;
-  names_.clear();
+  items_.clear();
   times_.clear();
   cells_.clear();
   return false;
@@ -67,11 +67,10 @@ void CsvTimeSeries::clear() {
   content_.clear();
   lastError_.clear();
   deleteValue_ = std::numeric_limits<float>::quiet_NaN();
-  names_.clear();
+  items_.clear();
   times_.clear();
   cells_.clear();
   cellsItem_ = 1;
-  values_.clear();
 }
 
 bool CsvTimeSeries::readPreamble(std::size_t& position) {
@@ -120,9 +119,8 @@ bool CsvTimeSeries::readHeader(std::string_view line) {
   while (cell != end) {
     const char* const begin = cell + 1;
     cell = csv::endOfCell(begin, end, separator_);
-    names_.emplace_back(csv::cellText(begin, cell));
+    items_.push_back({std::string(csv::cellText(begin, cell))});
   }
-  values_.resize(names_.size());
   return true;
 }
 
@@ -160,21 +158,12 @@ bool CsvTimeSeries::readRow(const char* line, const char* lineEnd, csv::DateScan
   second = *now;
   const int cellCount = csv::countSeparators(at, lineEnd, separator_, hasQuotes_);
   if (cellCount != itemCount()) {
-    return fail(line, std::to_string(names_.size() + 1) + " columns as in the header row",
+    return fail(line, std::to_string(items_.size() + 1) + " columns as in the header row",
                 std::to_string(cellCount + 1));
   }
   times_.push_back(static_cast<double>(second - startSecond_) / 86400.0);
   cells_.push_back(static_cast<std::size_t>(at + 1 - content_.data()));
   return true;
-}
-
-std::optional<DateRecord> CsvTimeSeries::startTime() const {
-  if (times_.empty()) return std::nullopt;
-  return dateOfSecond(startSecond_);
-}
-
-std::string CsvTimeSeries::itemName(int item) const {
-  return item >= 1 && item <= itemCount() ? names_[static_cast<std::size_t>(item - 1)] : std::string();
 }
 
 void CsvTimeSeries::moveToItem(int item) {
@@ -190,14 +179,9 @@ void CsvTimeSeries::moveToItem(int item) {
   cellsItem_ = item;
 }
 
-bool CsvTimeSeries::getData(int item) {
-  if (item < 1 || item > itemCount()) {
-    lastError_ = sourceName_ + ": no item " + std::to_string(item);
-    return false;
-  }
-  std::vector<float>& values = values_[static_cast<std::size_t>(item - 1)];
-  if (values.size() == times_.size()) return true;
-  moveToItem(item);
+bool CsvTimeSeries::readItem(std::size_t place) {
+  std::vector<float>& values = items_[place].values;
+  moveToItem(static_cast<int>(place) + 1);
   values.reserve(times_.size());
   const char* const begin = content_.data();
   const char* const end = begin + content_.size();
@@ -223,11 +207,6 @@ bool CsvTimeSeries::getData(int item) {
     values.push_back(*slow);
   }
   return true;
-}
-
-std::span<const float> CsvTimeSeries::values(int item) const {
-  if (item < 1 || item > itemCount()) return {};
-  return values_[static_cast<std::size_t>(item - 1)];
 }
 
 bool CsvTimeSeries::fail(const char* at, std::string_view expected, std::string_view found) {

@@ -4,40 +4,29 @@
 #include <limits>
 #include <utility>
 
+#include "common/calendar.h"
+
 namespace mirevo {
 
 MemoryTimeSeries::MemoryTimeSeries(DateRecord start, std::vector<double> times, std::vector<std::vector<float>> items,
                                    std::optional<float> deleteValue)
-    : start_(start),
-      times_(std::move(times)),
-      items_(std::move(items)),
-      // No number equals NaN: with it only NaN itself marks a gap.
-      deleteValue_(deleteValue.value_or(std::numeric_limits<float>::quiet_NaN())) {
-  for ([[maybe_unused]] const auto& item : items_) assert(item.size() == times_.size());
+    // No number equals NaN: with it only NaN itself marks a gap.
+    : deleteValue_(deleteValue.value_or(std::numeric_limits<float>::quiet_NaN())) {
+  startSecond_ = secondNumber(start);
+  times_ = std::move(times);
+  for (std::vector<float>& values : items) {
+    assert(values.size() == times_.size());
+    items_.push_back({"item " + std::to_string(items_.size() + 1), std::move(values)});
+  }
 }
 
 bool MemoryTimeSeries::open(const std::string& /*fileName*/) {
   return true;
 }
 
-std::optional<DateRecord> MemoryTimeSeries::startTime() const {
-  if (times_.empty()) return std::nullopt;
-  return start_;
-}
-
-std::string MemoryTimeSeries::itemName(int item) const {
-  return "item " + std::to_string(item);
-}
-
-bool MemoryTimeSeries::getData(int item) {
-  if (item >= 1 && item <= itemCount()) return true;
-  lastError_ = "no item " + std::to_string(item);
+bool MemoryTimeSeries::readItem(std::size_t place) {
+  lastError_ = sourceName_ + ": no values of " + items_[place].name;
   return false;
-}
-
-std::span<const float> MemoryTimeSeries::values(int item) const {
-  if (item < 1 || item > itemCount()) return {};
-  return items_[static_cast<std::size_t>(item - 1)];
 }
 
 }  // namespace mirevo

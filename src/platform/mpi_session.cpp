@@ -122,7 +122,9 @@ int launcherRank() {
 
 void MpiSession::start() {
   const auto launched = launchedProcessCount();
-  if (launched ? *launched <= 1 : launcherRank() < 0) return;
+  const bool isLaunched = launched || launcherRank() >= 0;
+  if (!isLaunched) return;  // variables that the user has set for a model's own MPI stay
+  if (launched && *launched <= 1) return hideJobFromModels();
   // Finalising waits in MPI itself; several processes may share a core.
   ::setenv("OMPI_MCA_mpi_yield_when_idle", "1", 0);
   int code = MPI_Init(nullptr, nullptr);

@@ -140,6 +140,7 @@ void NetcdfTimeSeries::close() {
   timeDimension_ = -1;
   times_.clear();
   items_.clear();
+  places_.clear();
 }
 
 bool NetcdfTimeSeries::fail(const std::string& what) {
@@ -233,69 +234,56 @@ bool NetcdfTimeSeries::findItems(int timeVariable) {
   for (int id = 0; id < variableCount; ++id) {
     const std::optional<Variable> variable = inquireVariable(file_, id);
     if (id == timeVariable || !variable || !isNumeric(variable->type) || variable->name == bounds) continue;
-    Item item;
-    item.variable = id;
-    item.name = variable->name;
-    item.dimensionCount = static_cast<int>(variable->dimensions.size());
-    item.timePosition = -1;
+    Place place;
+    place.variable = id;
+    place.dimensionCount = static_cast<int>(variable->dimensions.size());
+    place.timePosition = -1;
     int longDimensions = 0;
     std::size_t stations = 1;
-    for (int position = 0; position < item.dimensionCount; ++position) {
+    for (int position = 0; position < place.dimensionCount; ++position) {
       const auto p = static_cast<std::size_t>(position);
-      if (item.timePosition < 0 && variable->dimensions[p] == timeDimension_) {
-        item.timePosition = position;
+      if (place.timePosition < 0 && variable->dimensions[p] == timeDimension_) {
+        place.timePosition = position;
       } else if (variable->lengths[p] != 1) {
         ++longDimensions;
-        item.stationPosition = position;
+        place.stationPosition = position;
         stations = variable->lengths[p];
       }
     }
     // A grid over time is no table of stations: it has no items.
-    if (item.timePosition < 0 || longDimensions > 1) continue;
+    if (place.timePosition < 0 || longDimensions > 1) continue;
     if (items_.size() + stations > kMostItems) {
       return fail(fmt::format("expected at most {} items, found more at variable \"{}\"", kMostItems, variable->name));
     }
-    for (item.station = 0; item.station < stations; ++item.station) {
-      items_.push_back(item);
-      if (item.stationPosition >= 0) items_.back().name += fmt::format("[{}]", item.station + 1);
+    for (place.station = 0; place.station < stations; ++place.station) {
+      places_.push_back(place);
+      items_.push_back({variable->name});
+      if (place.stationPosition >= 0) items_.back().name += fmt::format("[{}]", place.station + 1);
     }
   }
   return true;
-}
-
-std::optional<DateRecord> NetcdfTimeSeries::startTime() const {
-  if (times_.empty()) return std::nullopt;
-  return dateOfSecond(startSecond_);
 }
 
 std::optional<float> NetcdfTimeSeries::deleteValue() const {
   return std::numeric_limits<float>::quiet_NaN();
 }
 
-std::string NetcdfTimeSeries::itemName(int item) const {
-  return item >= 1 && item <= itemCount() ? items_[static_cast<std::size_t>(item - 1)].name : std::string();
-}
-
-bool NetcdfTimeSeries::getData(int item) {
-  if (item < 1 || item > itemCount()) return fail("no item " + std::to_string(item));
-  Item& wanted = items_[static_cast<std::size_t>(item - 1)];
-  return wanted.values.size() == times_.size() || readValues(wanted);
-}
-
-bool NetcdfTimeSeries::readValues(Item& item) {
+bool NetcdfTimeSeries::readItem(std::size_t place) {
+  Item& item = items_[place];
+  const Place& at = places_[place];
   const std::string where = "variable \"" + item.name + "\"";
   nc_type type = NC_NAT;
-  if (!succeeded(nc_inq_vartype(file_, item.variable, &type), "reading " + where)) return false;
-  std::vector<std::size_t> start(static_cast<std::size_t>(item.dimensionCount), 0);
+  if (!succeeded(nc_inq_vartype(file_, at.variable, &type), "reading " + where)) return false;
+  std::vector<std::size_t> start(static_cast<std::size_t>(at.dimensionCount), 0);
   std::vector<std::size_t> count(start.size(), 1);
-  count[static_cast<std::size_t>(item.timePosition)] = times_.size();
-  if (item.stationPosition >= 0) start[static_cast<std::size_t>(item.stationPosition)] = item.station;
+  count[static_cast<std::size_t>(at.timePosition)] = times_.size();
+  if (at.stationPosition >= 0) start[static_cast<std::size_t>(at.stationPosition)] = at.station;
   std::vector<double> stored(times_.size());
-  if (!succeeded(nc_get_vara_double(file_, item.variable, start.data(), count.data(), stored.data()),
+  if (!succeeded(nc_get_vara_double(file_, at.variable, start.data(), count.data(), stored.data()),
                  "reading " + where)) {
     return false;
   }
-  const Unpacking unpack = unpackingOf(file_, item.variable, type);
+  const Unpacking unpack = unpackingOf(file_, at.variable, type);
   std::vector<float> values;
   values.reserve(stored.size());
   for (std::size_t step = 0; step < stored.size(); ++step) {
@@ -308,11 +296,6 @@ bool NetcdfTimeSeries::readValues(Item& item) {
   }
   item.values = std::move(values);
   return true;
-}
-
-std::span<const float> NetcdfTimeSeries::values(int item) const {
-  if (item < 1 || item > itemCount()) return {};
-  return items_[static_cast<std::size_t>(item - 1)].values;
 }
 
 }  // namespace mirevo

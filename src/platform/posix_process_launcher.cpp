@@ -151,7 +151,8 @@ bool PosixProcessLauncher::initialise(const LauncherSettings& settings) {
     groups_->makeCurrent();
     guard_ = std::make_unique<ChildGuard>();
     std::string reason;
-    if (!guard_->start(*groups_, reason)) fatalError("Unable to start the guard of the model's processes: " + reason);
+    if (!guard_->start(*groups_, mark_, reason))
+      fatalError("Unable to start the guard of the model's processes: " + reason);
     slots_.reserve(static_cast<std::size_t>(settings.slotCount));
     for (int number = 1; number <= settings.slotCount; ++number) prepareSlot(settings, number, arguments);
   } catch (const FatalError& error) {
@@ -200,6 +201,7 @@ void PosixProcessLauncher::prepareEnvironment(bool useSingleThread) {
   if (useSingleThread) {
     for (const std::string_view name : kThreadVariables) environmentTexts_.push_back(fmt::format("{}=1", name));
   }
+  environmentTexts_.emplace_back(mark_.variable());
   for (std::string& text : environmentTexts_) environment_.push_back(text.data());
   environment_.push_back(nullptr);
 }
@@ -351,6 +353,11 @@ void PosixProcessLauncher::waitForChange(double seconds) {
 }
 
 void PosixProcessLauncher::haltProcesses() {
+  haltGroups();
+  if (guard_) mark_.endBearers();  // without a guard nothing was started
+}
+
+void PosixProcessLauncher::haltGroups() {
   std::vector<pid_t> running;
   for (const Slot& slot : slots_) {
     if (slot.pidfd >= 0) running.push_back(slot.group);

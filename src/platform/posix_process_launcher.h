@@ -9,14 +9,15 @@
 #include "platform/child_guard.h"
 #include "platform/process_groups.h"
 #include "platform/process_launcher.h"
+#include "platform/process_mark.h"
 #include "platform/spawn_process.h"
 
 namespace mirevo {
 
 /// Runs batches as processes of this machine. A batch's item is a process group of its own; `mirevo_batch.log` in the
 /// slot's folder takes what the batch prints. When an item's first process ends, others of its group that still run are
-/// ended. No process of a batch outlives this program, however it ends; only one that has left its group on purpose
-/// (a daemon) is out of reach.
+/// ended. One that has left its group on purpose (a daemon) may serve later runs. No process of a batch outlives this
+/// program, however it ends.
 class PosixProcessLauncher final : public ProcessLauncher {
  public:
   PosixProcessLauncher() = default;
@@ -55,12 +56,14 @@ class PosixProcessLauncher final : public ProcessLauncher {
   void startItem(Slot& slot);
   void finishItem(Slot& slot, int code, int status);
   void endRestOfGroup(Slot& slot);
+  void haltGroups();
   void closeDescriptors();
   std::atomic<pid_t>& groupEntry(const Slot& slot) const;
 
   std::string lastError_;
   double graceSeconds_ = 0.0;
   std::vector<Slot> slots_;
+  ProcessMark mark_;
   std::vector<std::string> environmentTexts_;
   std::vector<char*> environment_;
   int nullInput_ = -1;

@@ -9,6 +9,7 @@
 #include <fcntl.h>
 #include <filesystem>
 #include <memory>
+#include <optional>
 #include <sys/stat.h>
 #include <unistd.h>
 #include <vector>
@@ -18,6 +19,7 @@
 #include "common/descriptor.h"
 #include "common/fatal_error.h"
 #include "platform/file_copy.h"
+#include "platform/run_made_entries.h"
 
 namespace mirevo {
 namespace {
@@ -26,9 +28,16 @@ namespace {
   fatalError(fmt::format("Unable to {} {}: {}", what, path, std::strerror(error)));
 }
 
-/// The names in a folder, sorted, without "." and "..".
-std::vector<std::string> namesIn(const std::string& path) {
+/// Whether the error says that something seen a moment ago is gone. Others may be at work where we look: a setup beside
+/// its model has the job's other ranks making their folders, and runs of other setups, in the folder that is copied.
+bool hasVanished(int error) {
+  return error == ENOENT || error == ESTALE;
+}
+
+/// The names in a folder, sorted, without "." and ".."; nothing when there is no such folder.
+std::optional<std::vector<std::string>> namesIn(const std::string& path) {
   const std::unique_ptr<DIR, int (*)(DIR*)> folder(::opendir(path.c_str()), &::closedir);
+  if (!folder && hasVanished(errno)) return std::nullopt;
   if (!folder) fail("read the folder", path, errno);
   std::vector<std::string> names;
   errno = 0;
@@ -42,10 +51,12 @@ std::vector<std::string> namesIn(const std::string& path) {
   return names;
 }
 
-struct stat statusOf(const std::string& path) {
+/// Nothing when there is nothing at `path`.
+std::optional<struct stat> statusOf(const std::string& path) {
   struct stat status {};
-  if (::lstat(path.c_str(), &status) != 0) fail("look at", path, errno);
-  return status;
+  if (::lstat(path.c_str(), &status) == 0) return status;
+  if (!hasVanished(errno)) fail("look at", path, errno);
+  return std::nullopt;
 }
 
 bool isFolder(const struct stat& status) {
@@ -54,11 +65,6 @@ bool isFolder(const struct stat& status) {
 
 /// Removes a file, a link, or a folder with all that it holds. Nothing need be there.
 void removeTree(const std::string& root) {
-  struct stat status {};
-  if (::lstat(root.c_str(), &status) != 0) {
-    if (errno == ENOENT) return;
-    fail("look at", root, errno);
-  }
   // Depth-first with a stack of our own: each folder is met once to empty it and, above its entries, once to remove it.
   struct Visit {
     std::string path;
@@ -70,16 +76,20 @@ void removeTree(const std::string& root) {
     const Visit visit = visits.back();
     visits.pop_back();
     if (visit.emptied) {
-      if (::rmdir(visit.path.c_str()) != 0) fail("remove the folder", visit.path, errno);
+      if (::rmdir(visit.path.c_str()) != 0 && !hasVanished(errno)) fail("remove the folder", visit.path, errno);
       continue;
     }
-    if (!isFolder(statusOf(visit.path))) {
-      if (::unlink(visit.path.c_str()) != 0) fail("remove", visit.path, errno);
+    const auto status = statusOf(visit.path);
+    if (!status) continue;
+    if (!isFolder(*status)) {
+      if (::unlink(visit.path.c_str()) != 0 && !hasVanished(errno)) fail("remove", visit.path, errno);
       continue;
     }
     ::chmod(visit.path.c_str(), S_IRWXU);  // a model may have made it read-only; a failure shows below
     visits.push_back({visit.path, true});
-    for (const std::string& name : namesIn(visit.path)) visits.push_back({visit.path + "/" + name, false});
+    const auto names = namesIn(visit.path);
+    if (!names) continue;
+    for (const std::string& name : *names) visits.push_back({visit.path + "/" + name, false});
   }
 }
 
@@ -90,10 +100,16 @@ void copyTimes(int to, const struct stat& status) {
 
 void copyFile(const std::string& source, const std::string& target, const struct stat& status) {
   const Descriptor from(::open(source.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW));
+  if (from.get() < 0 && hasVanished(errno)) return;
   if (from.get() < 0) fail("read", source, errno);
   const Descriptor to(::open(target.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, S_IRUSR | S_IWUSR));
   if (to.get() < 0) fail("create", target, errno);
-  if (status.st_size > 0 && !copyContent(from.get(), to.get())) fail("write", target, errno);
+  if (status.st_size > 0 && !copyContent(from.get(), to.get())) {
+    const int error = errno;
+    if (!hasVanished(error)) fail("write", target, error);
+    ::unlink(target.c_str());  // removed on another machine, whose disk this is
+    return;
+  }
   if (::fchmod(to.get(), status.st_mode & 07777) != 0) fail("set the mode of", target, errno);
   copyTimes(to.get(), status);
 }
@@ -107,6 +123,7 @@ void copyLink(const std::string& source, const std::string& target, const std::s
               const std::string& targetRoot) {
   std::array<char, PATH_MAX> buffer{};
   const ssize_t length = ::readlink(source.c_str(), buffer.data(), buffer.size());
+  if (length < 0 && hasVanished(errno)) return;
   if (length < 0) fail("read the link", source, errno);
   const std::string text(buffer.data(), static_cast<std::size_t>(length));
   const std::filesystem::path written(text);
@@ -121,75 +138,111 @@ void copyLink(const std::string& source, const std::string& target, const std::s
   if (::symlink(content.c_str(), target.c_str()) != 0) fail("create the link", target, errno);
 }
 
-bool isNumber(std::string_view text) {
-  return !text.empty() && text.find_first_not_of("0123456789") == std::string_view::npos;
-}
+/// The folder in which this run makes its process folders, and how their names begin.
+class ProcessFolderNames final {
+ public:
+  explicit ProcessFolderNames(std::string_view prefix) {
+    const std::size_t slash = prefix.rfind('/');
+    beginning_ = prefix.substr(slash + 1);
+    isKnown_ = ::stat(std::string(prefix.substr(0, slash + 1)).c_str(), &parent_) == 0;
+  }
 
-/// Whether the folder holds the saved output files of a run, or of an earlier one, of a setup that lies beside it.
-bool isSavedOutput(std::string_view path) {
-  static constexpr std::string_view kMark = "_Saved";
-  const auto mark = path.rfind(kMark);
-  if (mark == std::string_view::npos) return false;
-  const std::string_view rest = path.substr(mark + kMark.size());
-  if (!rest.empty() && !(rest.front() == '.' && isNumber(rest.substr(1)))) return false;
-  struct stat status {};
-  return ::stat(std::string(path.substr(0, mark)).append(".kdx").c_str(), &status) == 0;
-}
+  /// By the folder's identity, as its path may differ by a link.
+  bool liesIn(const struct stat& folder) const {
+    return isKnown_ && folder.st_dev == parent_.st_dev && folder.st_ino == parent_.st_ino;
+  }
+  bool contains(std::string_view name) const {
+    if (!name.starts_with(beginning_)) return false;
+    name.remove_prefix(beginning_.size());
+    return takeNumber(name) && name.empty();
+  }
 
-/// Whether the folder is what a run makes, this or another, and not the model's.
-bool isMadeByRuns(const std::string& path, std::string_view prefix) {
-  if (path.starts_with(prefix) && isNumber(std::string_view(path).substr(prefix.size()))) return true;
-  if (isSavedOutput(path)) return true;
-  static constexpr std::string_view kMark = "_Process";
-  const auto mark = path.rfind(kMark);
-  if (mark == std::string::npos || !isNumber(std::string_view(path).substr(mark + kMark.size()))) return false;
-  struct stat status {};
-  return ::stat((path + "/" + kBatchLogName).c_str(), &status) == 0;
-}
+ private:
+  std::string_view beginning_;
+  struct stat parent_ {};
+  bool isKnown_ = false;
+};
 
 struct CopiedFolder {
   std::string target;
   struct stat status;
 };
 
+/// The copy of the model's own part of a folder, without recursion.
+class FolderCopy final {
+ public:
+  FolderCopy(const std::string& source, const std::string& target, std::string_view processFolderPrefix)
+      : source_(source), target_(target), processFolders_(processFolderPrefix) {}
+
+  void copyAll() {
+    pending_ = {""};  // paths below the root, each with its leading "/"
+    while (!pending_.empty()) {
+      const std::string below = std::move(pending_.back());
+      pending_.pop_back();
+      copyFolder(below);
+    }
+    // A folder is writable while it is filled; its own mode and time follow when everything is in.
+    for (auto folder = made_.rbegin(); folder != made_.rend(); ++folder) {
+      const Descriptor opened(::open(folder->target.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+      if (opened.get() < 0 || ::fchmod(opened.get(), (folder->status.st_mode & 07777) | S_IRWXU) != 0) {
+        fail("set the mode of", folder->target, errno);
+      }
+      copyTimes(opened.get(), folder->status);
+    }
+  }
+
+ private:
+  void copyFolder(const std::string& below) {
+    const std::string from = source_ + below;
+    const std::string to = target_ + below;
+    const auto names = namesIn(from);
+    struct stat status {};
+    if (!names || ::stat(from.c_str(), &status) != 0) {
+      const int error = names ? errno : ENOENT;
+      if (!below.empty() && hasVanished(error)) return;
+      fail("read the folder", from, error);
+    }
+    if (::mkdir(to.c_str(), S_IRWXU) != 0) fail("create the folder", to, errno);
+    made_.push_back({to, status});
+    const bool holdsProcessFolders = processFolders_.liesIn(status);
+    const RunMadeEntries runMade(from, *names);
+    for (const std::string& name : *names) {
+      const bool isBatchLog = below.empty() && name == kBatchLogName;
+      const bool isProcessFolder = holdsProcessFolders && processFolders_.contains(name);
+      if (isBatchLog || isProcessFolder || runMade.contains(name)) continue;
+      std::string path = below;
+      copyEntry(path.append("/").append(name));
+    }
+  }
+
+  void copyEntry(const std::string& path) {
+    const std::string from = source_ + path;
+    const std::string to = target_ + path;
+    const auto status = statusOf(from);
+    if (!status) return;
+    if (isFolder(*status)) {
+      pending_.push_back(path);
+    } else if (S_ISLNK(status->st_mode)) {
+      copyLink(from, to, source_, target_);
+    } else if (S_ISREG(status->st_mode)) {
+      copyFile(from, to, *status);
+    } else if (S_ISFIFO(status->st_mode) && ::mkfifo(to.c_str(), status->st_mode & 07777) != 0) {
+      fail("create", to, errno);
+    }
+  }
+
+  const std::string& source_;
+  const std::string& target_;
+  ProcessFolderNames processFolders_;
+  std::vector<std::string> pending_;
+  std::vector<CopiedFolder> made_;
+};
+
 }  // namespace
 
 void makeProcessFolder(const std::string& source, const std::string& target, std::string_view processFolderPrefix) {
   removeTree(target);
-  std::vector<std::string> pending = {""};  // paths below the root, each with its leading "/"
-  std::vector<CopiedFolder> made;
-  while (!pending.empty()) {
-    const std::string below = std::move(pending.back());
-    pending.pop_back();
-    const std::vector<std::string> names = namesIn(source + below);
-    // Writable while it is filled; its own mode and time follow when everything is in.
-    if (::mkdir((target + below).c_str(), S_IRWXU) != 0) fail("create the folder", target + below, errno);
-    made.push_back({target + below, {}});
-    if (::stat((source + below).c_str(), &made.back().status) != 0) fail("look at", source + below, errno);
-    for (const std::string& name : names) {
-      std::string path = below;
-      path.append("/").append(name);
-      const std::string from = source + path;
-      const std::string to = target + path;
-      const struct stat status = statusOf(from);
-      if (isFolder(status)) {
-        if (!isMadeByRuns(from, processFolderPrefix)) pending.push_back(path);
-      } else if (S_ISLNK(status.st_mode)) {
-        copyLink(from, to, source, target);
-      } else if (S_ISREG(status.st_mode)) {
-        if (path != std::string("/") + kBatchLogName) copyFile(from, to, status);
-      } else if (S_ISFIFO(status.st_mode) && ::mkfifo(to.c_str(), status.st_mode & 07777) != 0) {
-        fail("create", to, errno);
-      }
-    }
-  }
-  for (auto folder = made.rbegin(); folder != made.rend(); ++folder) {
-    const Descriptor opened(::open(folder->target.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
-    if (opened.get() < 0 || ::fchmod(opened.get(), (folder->status.st_mode & 07777) | S_IRWXU) != 0) {
-      fail("set the mode of", folder->target, errno);
-    }
-    copyTimes(opened.get(), folder->status);
-  }
+  FolderCopy(source, target, processFolderPrefix).copyAll();
 }
 
 }  // namespace mirevo

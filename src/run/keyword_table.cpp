@@ -351,7 +351,7 @@ const std::vector<KeywordRow>& rows() {
        MIREVO_FIELD(c.uncertainty.parameters[i].standardDeviation)},
       {kSlots, "NoSimultaneousSim", Type::integer, "1", from(1), "model runs",
        "Model runs at once, each in a process folder of its own; no more than the run has evaluations. In an "
-       "optimisation more than 1 needs PSE.",
+       "optimisation more than 1 needs PSE. In an MPI job: 1 on each worker.",
        MIREVO_FIELD(c.simultaneousSimulations)},
       {kSlots, "UseSingleThread", Type::integer, "0", kAny, "", "1: tells each model run to use one thread.",
        MIREVO_FIELD(c.useSingleThread)},

@@ -74,6 +74,7 @@ struct RunConfig {
   std::int32_t randomSeed = 1;  ///< of the initial sample and of the uncertainty analysis: one setting
 
   std::int32_t simultaneousSimulations = 1;
+  bool usesMpiWorkers = false;  ///< then `simultaneousSimulations` is 1, on each worker
   bool useSingleThread = false;
   std::string processFolder;  ///< where the process folders are made; empty: beside the setup
 

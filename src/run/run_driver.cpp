@@ -7,7 +7,6 @@
 #include <fmt/format.h>
 
 #include "common/fatal_error.h"
-#include "common/files.h"
 #include "common/text.h"
 #include "evaluation/local_evaluator.h"
 #include "evaluation/mpi_evaluator.h"
@@ -51,12 +50,13 @@ int RunDriver::run(const std::string& setupFileName) {
     startMpi(state_);
     if (state_.mpiRank > 0) return runWorker(state_.mpi);
     openRun(setupFileName);
-    config_ = readSetupFile(setupFileName, state_.log);
-    if (state_.mpiInUse) config_.simultaneousSimulations = 1;  // a model run a worker
+    const std::string setupText = readSetupText(setupFileName);
+    config_ = readSetup(setupFileName, setupText, state_.log, state_.mpiInUse);
     buildModel();
-    if (state_.mpiInUse) startWorkers();
     logSetup();
     openResults();
+    // Not before earlier results have been renamed: where they lie in the base folder, workers look at them.
+    if (state_.mpiInUse) beginWorkers(state_.mpi, {config_.setupFile, setupText});
     state_.progress.writeMessage("Title: " + config_.title);
     state_.progress.writeStatus(taskName(config_));
     state_.progress.progressEvaluationLabel(config_.plannedEvaluations());
@@ -109,13 +109,6 @@ void RunDriver::buildModel() {
   const int slotCount = state_.mpiInUse ? 0 : config_.simultaneousSimulations;  // the master runs no model
   runner_ = std::make_unique<ModelRunner>(describeModel(config_), *parameters_, *aggregator_, *launcher_,
                                           launcherSettings(config_, slotCount));
-}
-
-void RunDriver::startWorkers() {
-  std::string reason;
-  auto text = readTextFile(config_.setupFile, reason);
-  if (!text) fatalError("Error: Unable to open " + config_.setupFile, reason);
-  beginWorkers(state_.mpi, {config_.setupFile, std::move(*text)});
 }
 
 void RunDriver::logSetup() {
@@ -212,8 +205,8 @@ void RunDriver::finish(const TaskOutcome& outcome) {
     fatalError("Error: Unable to write to " + state_.log.path(), state_.log.writeError());
   }
   signalState.runLogDescriptor = -1;
-  state_.log.close();
   leaveJob(0, kNormalTermination);
+  state_.log.close();
   state_.progress.progressEnd(kNormalTermination);
 }
 
@@ -252,8 +245,13 @@ int RunDriver::endEarly(std::string_view ending) {
 void RunDriver::leaveJob(int exitCode, std::string_view ending) {
   if (!state_.mpiInUse) return;
   std::string reason = "a worker did not answer the request to stop";
+  const auto warn = [this, exitCode](const std::string& text) {
+    if (exitCode != 0) return;  // the run has failed already, with the first reason
+    state_.log.warning(text);
+    showMessage("Warning: " + text);
+  };
   try {
-    if (stopWorkers(state_.mpi, exitCode == 0 ? kWorkerPatienceSeconds : kWorkerStopSeconds)) {
+    if (stopWorkers(state_.mpi, exitCode == 0 ? kWorkerPatienceSeconds : kWorkerStopSeconds, warn)) {
       state_.mpi.finalise(kWorkerStopSeconds);
       return;
     }

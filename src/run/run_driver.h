@@ -37,7 +37,6 @@ class RunDriver final {
  private:
   void openRun(const std::string& setupFileName);
   void buildModel();
-  void startWorkers();
   void logSetup();
   void openResults();
   void openResultFile();

@@ -161,6 +161,10 @@ void SetupSection::warn(std::string_view keyword, std::string_view text) const {
   file_->log().warning(fmt::format("{}: {}: {}", place(keyword), keyword, text));
 }
 
+void SetupSection::note(std::string_view keyword, std::string_view text) const {
+  file_->log().line(fmt::format("  {}: {}", keyword, text));
+}
+
 std::string SetupSection::written(std::string_view keyword) const {
   const KdxKeyword* found = node_->keyword(keyword);
   const auto* text = found == nullptr ? nullptr : std::get_if<std::string>(&found->values.front().value);

@@ -63,6 +63,9 @@ class SetupSection final {
   /// A warning in the log with the keyword's place.
   void warn(std::string_view keyword, std::string_view text) const;
 
+  /// A line below the keyword's echo in the log.
+  void note(std::string_view keyword, std::string_view text) const;
+
   /// The name without its path.
   std::string name() const;
   const std::string& path() const { return path_; }

@@ -25,7 +25,8 @@ constexpr std::array<std::string_view, 14> kModelSetupEndings = {
 /// One method a section, called in the order of the sections; each validates what it has read before it returns.
 class SetupReader final {
  public:
-  SetupReader(SetupFile& file, const SetupLocation& location) : target_(file.target()) {
+  SetupReader(SetupFile& file, const SetupLocation& location, bool usesMpiWorkers) : target_(file.target()) {
+    config_.usesMpiWorkers = usesMpiWorkers;
     config_.setupFile = location.file;
     config_.setupFolder = location.folder;
     config_.setupName = location.name;
@@ -398,6 +399,12 @@ void SetupReader::readSimultaneousSimulations() {
   const SetupSection section = target_.open("SimultaneousSimulations");
   section.read(config_);
   validateProcessCount(config_, section);
+  if (config_.usesMpiWorkers) {
+    if (config_.simultaneousSimulations > 1)
+      section.note("NoSimultaneousSim", "taken as 1 on each worker of the MPI job");
+    config_.simultaneousSimulations = 1;
+    return;
+  }
   // A slot has its own copy of the model: ones without work would only fill the disk.
   const int mostUsed = std::max(1, config_.plannedEvaluations());
   if (config_.simultaneousSimulations <= mostUsed) return;
@@ -421,19 +428,23 @@ void SetupReader::readMeasureFile() {
 
 }  // namespace
 
-RunConfig readSetup(const std::string& fileName, std::string_view text, RunLog& log) {
+RunConfig readSetup(const std::string& fileName, std::string_view text, RunLog& log, bool usesMpiWorkers) {
   const SetupLocation location = locateSetup(fileName);
   SetupFile file(std::string(trim(fileName)), location.folder, text, log);
   warnAboutUnusedEntries(file);
-  return SetupReader(file, location).read();
+  return SetupReader(file, location, usesMpiWorkers).read();
 }
 
 RunConfig readSetupFile(const std::string& fileName, RunLog& log) {
+  return readSetup(fileName, readSetupText(fileName), log);
+}
+
+std::string readSetupText(const std::string& fileName) {
   const std::string name(trim(fileName));
   std::string reason;
-  const auto text = readTextFile(name, reason);
+  auto text = readTextFile(name, reason);
   if (!text) fatalError("Error: Unable to open " + name, reason);
-  return readSetup(name, *text, log);
+  return std::move(*text);
 }
 
 }  // namespace mirevo

@@ -290,6 +290,7 @@ void validateUncertaintyDeviation(const NormalDistribution& parameter, const Set
 
 void validateProcessCount(const RunConfig& config, const SetupSection& section) {
   section.check("NoSimultaneousSim", config.simultaneousSimulations, "Error: Invalid No. of processes");
+  if (config.usesMpiWorkers) return;
   if (config.simultaneousSimulations > 1 && config.simulationOption == SimulationOption::parameterOptimisation &&
       config.optimisation.algorithmType != AlgorithmType::pse) {
     section.refuse("Error: Use Population Simplex Evolution algorithm for application with multiple processors",

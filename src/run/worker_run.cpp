@@ -26,7 +26,7 @@ void work(MpiSession& mpi) {
   const auto begin = awaitBegin(mpi);
   if (!begin) return;
   RunLog unread;  // the master's log has all of it
-  const RunConfig config = readSetup(begin->setupFile, begin->text, unread);
+  const RunConfig config = readSetup(begin->setupFile, begin->text, unread, true);
   ParameterModel parameters(config.parameters, config.constraints);
   ObjectiveAggregator aggregator(config.objectives, config.aggregationMethod);
   PosixProcessLauncher launcher;

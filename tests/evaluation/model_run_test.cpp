@@ -1,6 +1,7 @@
 #include "evaluation/model_run.h"
 
 #include "evaluation/evaluation_fixture.h"
+#include "evaluation/evaluation_ledger.h"
 #include "evaluation/fake_launcher.h"
 
 namespace mirevo {
@@ -160,27 +161,30 @@ TEST_F(ModelRunTest, ARunThatMeetsFewerObservationsThanAnyBeforeIsNamedInAWarnin
     const char* simulated;
     const char* warning;  ///< its part that differs; none when empty
   } cases[] = {{"2001-01-01,4\n2001-01-02,4\n2001-01-03,4\n2001-01-04,4\n2001-01-05,4\n", ""},
-               {"2001-01-01,4\n2001-01-02,4\n2001-01-03,4\n2001-01-04,4\n", "1 of 5 observations"},
+               {"2001-01-01,4\n2001-01-02,4\n2001-01-03,4\n2001-01-04,4\n", "1 of 5"},
                {"2001-01-01,4\n2001-01-02,4\n2001-01-03,4\n2001-01-04,NaN\n2001-01-05,4\n", ""},
-               {"2001-01-01,4\n2001-01-02,4\n", "3 of 5 observations"},
-               {"2001-01-01,4\n2001-01-02,4\n", ""}};
+               {"2001-01-01,4\n2001-01-02,4\n", "3 of 5"},
+               {"2001-01-01,4\n2001-01-02,4\n", ""},
+               {"2001-01-01,4\n", "4 of 5"}};
+  FailedRunPolicy failedRuns(10);
+  EvaluationLedger ledger(observer_, failedRuns);
+  const std::vector<ParameterSet> sets(std::size(cases), {2.0});
+  ledger.begin(sets);
+  std::string last;
   for (const auto& c : cases) {
     writes("simulated.csv", std::string("time,flow\n") + c.simulated);
     const EvaluationResult result = evaluate(2.0);
     EXPECT_THAT(result.measureValues, ElementsAre(3.0));  // judged on what there is
-    if (*c.warning == '\0') {
-      EXPECT_THAT(result.warnings, testing::IsEmpty()) << c.simulated;
-    } else {
-      EXPECT_THAT(result.warnings,
-                  ElementsAre(testing::StartsWith(std::string("output measure \"bias\": ") + c.warning)));
-    }
+    observer_.events.clear();
+    ledger.finish(*ledger.takeNext(), result);
+    last = observer_.events.front();
+    EXPECT_EQ(last.starts_with("warning: "), *c.warning != '\0') << last;
+    EXPECT_THAT(last, testing::HasSubstr(c.warning));
   }
-  writes("simulated.csv", "time,flow\n2001-01-01,4\n");
-  EXPECT_THAT(
-      evaluate(2.0).warnings,
-      ElementsAre("output measure \"bias\": 4 of 5 observations in the evaluation period "
-                  "are not used, as item No. 1 of " +
-                  (folder_ / "base/simulated.csv") + " has no value at their time; the first is at 2001-01-02 00:00"));
+  EXPECT_EQ(last,
+            "warning: Evaluation of parameter set No. 6: output measure \"bias\": 4 of 5 observations in the "
+            "evaluation period are not used, as item No. 1 of " +
+                (folder_ / "base/simulated.csv") + " has no value at their time; the first is at 2001-01-02 00:00");
 }
 
 TEST_F(ModelRunTest, SavedFilesAreThoseThatTheRunWrote) {

@@ -154,15 +154,18 @@ TEST_F(MpiEvaluatorTest, ACancelledRunStopsWhileWorkersAreBusy) {
 
 TEST_F(MpiEvaluatorTest, StoppingGoesInRankOrderAndEndsWithTheLastFarewell) {
   channel_.onSend = nullptr;
-  channel_.deliver(2, RankMessage::failure, encode(FailureMessage{"too late", {}}));
+  channel_.deliver(2, RankMessage::failure, encode(FailureMessage{"too late", "No space left"}));
   channel_.deliver(2, RankMessage::farewell, {});
   channel_.deliver(1, RankMessage::farewell, {});
-  EXPECT_TRUE(stopWorkers(channel_, 5.0));
+  std::vector<std::string> warnings;
+  const auto warn = [&](const std::string& text) { warnings.push_back(text); };
+  EXPECT_TRUE(stopWorkers(channel_, 5.0, warn));
+  EXPECT_THAT(warnings, ElementsAre("Worker 2 met an error that no evaluation depended on: too late\nNo space left"));
   ASSERT_EQ(channel_.sent.size(), 2U);
   EXPECT_EQ(channel_.sent[0].rank, 1);
   EXPECT_EQ(channel_.sent[1].tag, static_cast<int>(RankMessage::stop));
   channel_.deliver(1, RankMessage::farewell, {});
-  EXPECT_FALSE(stopWorkers(channel_, 5.0));  // the other one says nothing
+  EXPECT_FALSE(stopWorkers(channel_, 5.0, warn));  // the other one says nothing
 }
 
 }  // namespace

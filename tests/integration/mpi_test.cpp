@@ -13,6 +13,9 @@ using ::testing::AnyOf;
 using ::testing::HasSubstr;
 using ::testing::Not;
 
+/// A model that uses MPI itself must not take itself for a process of this job.
+constexpr char kCountsJobVariables[] = "env | grep -cE '^(OMPI|PMIX|PMI)_' > job_variables.txt";
+
 /// Everything in a result file but when it was made.
 std::string withoutDate(const std::string& results) {
   const auto start = results.find("# Started: ");
@@ -86,27 +89,31 @@ TEST_F(Mpi, AJobWritesTheResultsOfAPlainRun) {
     RunSettings settings;
     const char* results;
     int processes;
+    int jobSlots = 1;  // what the setup has for the job, where it counts for nothing
   } cases[] = {
-      {{.maxEvaluations = 25}, "basin_Optimisation.dat", 2},
+      {{.maxEvaluations = 25}, "basin_Optimisation.dat", 2, 3},
       {{.option = 3, .maxEvaluations = 15, .savedFile = "model/simulated.csv"}, "basin.dat", 3},
       // Two of them fail, which is as many as may.
       {{.option = 0, .scenarios = scenarios(20), .modelArguments = "--fail-above 8", .processFolder = "scratch/made"},
        "basin.dat",
        3},
   };
-  useScript("env | grep -cE '^(OMPI|PMIX|PMI)_' > job_variables.txt");
+  useScript(kCountsJobVariables);
   for (const auto& c : cases) {
-    const std::string setup = folder_.writeSetup(c.settings);
+    RunSettings settings = c.settings;
+    const std::string setup = folder_.writeSetup(settings);
     ASSERT_EQ(runProgram({setup}).exitCode, 0) << log();
     const std::string plain = folder_.read(c.results);
+    settings.slots = c.jobSlots;
+    folder_.writeSetup(settings);
     const ProgramResult job = runJob(c.processes, {setup});
     EXPECT_EQ(job.exitCode, 0) << job.error << log();
     EXPECT_EQ(job.output + job.error, "");
     EXPECT_EQ(withoutDate(folder_.read(c.results)), withoutDate(plain));
+    EXPECT_EQ(occurrences(log(), "NoSimultaneousSim: taken as 1 on each worker"), c.jobSlots > 1 ? 1 : 0);
     EXPECT_THAT(log(), HasSubstr(fmt::format("MPI job: this master and {} workers", c.processes - 1)));
     EXPECT_THAT(log(), ::testing::EndsWith("\n\nNormal termination\n"));
     for (int rank = 1; rank < c.processes; ++rank) {
-      // A model that uses MPI itself must not take itself for a process of this job.
       EXPECT_EQ(folder_.read(processFolder(c.settings, rank) + "/job_variables.txt"), "0\n");
     }
     EXPECT_EQ(processFolder(c.settings, 0), "");
@@ -118,11 +125,44 @@ TEST_F(Mpi, AJobWritesTheResultsOfAPlainRun) {
   }
 }
 
+// Its ranks make their process folders while the others do so and the master opens its files, all in one folder, which
+// is the one that they copy. What they copy of it is the model, whatever earlier runs have left there.
+TEST_F(Mpi, ASetupBesideItsModelIsRunByManyRanks) {
+  folder_.write("run.sh", "#!/bin/sh\ncd model && exec ./run.sh \"$@\"\n", 0755);
+  folder_.write("basin.txt", "the model's own");
+  for (int i = 0; i < 40; ++i) folder_.write(fmt::format("maps/{}.bin", i), std::string(100'000, 'm'));
+  RunSettings settings{.maxEvaluations = 15, .batchFile = "run.sh", .savedFile = "model/simulated.csv"};
+  for (settings.option = 1; settings.option <= 3; ++settings.option) {
+    ASSERT_EQ(runProgram({folder_.writeSetup(settings)}).exitCode, 0) << log();
+  }
+  settings.option = 0;
+  settings.scenarios = scenarios(20);
+  settings.modelArguments = "--fail-above 8.3";
+  for (const char* processFolders : {"", "", "scratch"}) {
+    settings.processFolder = processFolders;
+    const ProgramResult job = runJob(12, {folder_.writeSetup(settings)});
+    ASSERT_EQ(job.exitCode, 0) << job.error << log();
+    for (int rank = 1; rank < 12; ++rank) {
+      std::vector<std::string> names;
+      for (const auto& entry : std::filesystem::directory_iterator(folder_ / processFolder(settings, rank))) {
+        names.push_back(entry.path().filename().string());
+      }
+      EXPECT_THAT(names,
+                  ::testing::IsSupersetOf({"basin.kdx", "basin.txt", "maps", "model", "observed.csv", "run.sh"}));
+      EXPECT_THAT(names, ::testing::Each(AnyOf("basin.kdx", "basin.txt", "maps", "model", "observed.csv", "run.sh",
+                                               "mirevo_batch.log", "scratch")));
+    }
+  }
+  EXPECT_TRUE(folder_.exists("calSimErr.dat"));  // there was something of everything
+  EXPECT_TRUE(folder_.exists("basin_Saved.1"));
+}
+
 TEST_F(Mpi, AProcessAloneInItsJobIsAPlainRun) {
+  useScript(kCountsJobVariables);
   const ProgramResult job = runJob(1, {folder_.writeSetup({.option = 0, .scenarios = scenarios(4), .slots = 2})});
   EXPECT_EQ(job.exitCode, 0) << job.error << log();
   EXPECT_THAT(log(), Not(HasSubstr("MPI")));
-  EXPECT_TRUE(folder_.exists("basin_Process2"));
+  EXPECT_EQ(folder_.read("basin_Process2/job_variables.txt"), "0\n");
 }
 
 TEST_F(Mpi, AnErrorEndsTheJobWithItsMessageOnce) {
@@ -189,6 +229,13 @@ class HangingMpi : public Mpi {
     for (const int process : {model_, worker_, grandchild_}) expectGone(process);
   }
 
+  /// mpirun gives the ranks so many seconds between SIGTERM and SIGKILL; its own one is short for a busy machine.
+  static RunningProgram::Environment patientEnvironment() {
+    RunningProgram::Environment variables = environment();
+    variables["OMPI_MCA_odls_base_sigkill_timeout"] = "3";
+    return variables;
+  }
+
   std::string setup_;
   int model_ = 0;
   int worker_ = 0;
@@ -212,7 +259,7 @@ TEST_F(HangingMpi, AKillFileStopsEveryRankInFiveSeconds) {
 }
 
 TEST_F(HangingMpi, ATerminatedLauncherLeavesNoProcess) {
-  RunningProgram job(command(3, {setup_}), environment(), "mpirun");
+  RunningProgram job(command(3, {setup_}), patientEnvironment(), "mpirun");
   waitUntilOneIsLeft();
   job.send(SIGTERM);
   const ProgramResult result = job.wait(20.0);
@@ -223,7 +270,7 @@ TEST_F(HangingMpi, ATerminatedLauncherLeavesNoProcess) {
 }
 
 TEST_F(HangingMpi, AKilledWorkerEndsTheJob) {
-  RunningProgram job(command(3, {setup_}), environment(), "mpirun");
+  RunningProgram job(command(3, {setup_}), patientEnvironment(), "mpirun");
   waitUntilOneIsLeft();
   ::kill(worker_, SIGKILL);
   const ProgramResult result = job.wait(20.0);

@@ -222,6 +222,18 @@ TEST_F(PosixProcessLauncherTest, EndsAndNamesWhatABatchLeavesBehind) {
   EXPECT_EQ(launcher_.leftBehind(1), "");
 }
 
+TEST_F(PosixProcessLauncherTest, ADaemonMayServeLaterRunsButDoesNotOutliveThem) {
+  folder_.write("base/run.sh",
+                "setsid sh -c 'echo $$ >id.txt; exec sleep 60' &\nwhile ! [ -s id.txt ]; do sleep 0.01; done\n");
+  addItem("run.sh");
+  initialise();
+  EXPECT_EQ(run(), BatchStatus::succeeded);
+  const int daemon = std::stoi(read("id.txt"));
+  EXPECT_FALSE(isGone(daemon));
+  launcher_.haltProcesses();
+  EXPECT_TRUE(isGone(daemon));
+}
+
 TEST_F(PosixProcessLauncherTest, SlotsRunAtOnceAndTheWaitEndsWithTheFirst) {
   addModel("");
   settings_.slotCount = 2;
@@ -274,7 +286,7 @@ TEST_F(PosixProcessLauncherTest, HaltingIsGentleFirstAndThenSure) {
 }
 
 TEST_F(PosixProcessLauncherTest, NothingOutlivesTheProgram) {
-  // Each way for a program to end, with two slots running a shell, a model and a stubborn grandchild each.
+  // Each way for a program to end, with two slots running a shell, a daemon, a model and a stubborn grandchild each.
   const struct {
     const char* name;
     std::function<void()> end;
@@ -290,8 +302,10 @@ TEST_F(PosixProcessLauncherTest, NothingOutlivesTheProgram) {
        }},
       {"exits without a word", [] { ::_exit(0); }},
   };
-  folder_.write("base/run.sh", "trap '' TERM\n" MIREVO_TEST_MODEL
-                               " --grandchild id.txt --ignore-term 1 --sleep-ms 60000\necho never >never.txt\n");
+  folder_.write("base/run.sh",
+                "trap '' TERM\nsetsid sh -c 'echo $$ >daemon.txt; exec sleep 60' &\n"
+                "while ! [ -s daemon.txt ]; do sleep 0.01; done\n" MIREVO_TEST_MODEL
+                " --grandchild id.txt --ignore-term 1 --sleep-ms 60000\necho never >never.txt\n");
   addItem("run.sh");
   settings_.slotCount = 2;
   for (const auto& c : cases) {
@@ -309,9 +323,11 @@ TEST_F(PosixProcessLauncherTest, NothingOutlivesTheProgram) {
     ASSERT_EQ(::waitpid(program, &status, 0), program);
     EXPECT_FALSE(WIFEXITED(status) && WEXITSTATUS(status) == 9) << c.name;
     for (const char* slot : {"run_Process1", "run_Process2"}) {
-      const std::string id = folder_.read(std::string(slot) + "/id.txt");
-      ASSERT_FALSE(id.empty()) << c.name;
-      EXPECT_TRUE(comesTrue([&] { return isGone(std::stoi(id)); })) << c.name;
+      for (const char* file : {"/id.txt", "/daemon.txt"}) {
+        const std::string id = folder_.read(slot + std::string(file));
+        ASSERT_FALSE(id.empty()) << c.name;
+        EXPECT_TRUE(comesTrue([&] { return isGone(std::stoi(id)); })) << c.name << file;
+      }
       EXPECT_FALSE(folder_.exists(std::string(slot) + "/never.txt")) << c.name;
     }
   }

@@ -95,11 +95,38 @@ TEST(ProcessFolder, NeverCopiesWhatRunsMake) {
   folder.write("other_Process1/" + std::string(kBatchLogName), "log");  // of another setup's run
   folder.write("my_Process1/data.txt", "mine");                         // somebody's own: no batch log
   folder.write("cal_Processes/data.txt", "mine");
-  folder.write("cal.kdx", "");
-  folder.write("cal_Saved/1/out.csv", "");
-  folder.write("cal_Saved.12/1/out.csv", "");
-  folder.write("cal_Saved.old/data.txt", "mine");
-  folder.write("my_Saved/data.txt", "mine");  // no setup of that name
+  folder.write("in/deep/cal.KDX", "");
+  folder.write("in/deep/cal_Saved/1/out.csv", "");
+  for (const char* setup : {"cal.kdx", "cal.1.kdx"}) folder.write(setup, "");
+  const struct {
+    const char* name;
+    const char* content;
+    bool isCopied;
+  } files[] = {
+      {"cal_Saved/out.csv", "", false},
+      {"cal_Saved.12/out.csv", "", false},
+      {"cal_Saved.old/data.txt", "mine", true},
+      {"my_Saved/data.txt", "mine", true},  // no setup of that name
+      {"cal_Failed17/run.sh", "", false},
+      {"cal_Failed/run.sh", "mine", true},
+      {"cal_Optimisation.dat", "", false},
+      {"cal_Optimisation.3.dat", "", false},
+      {"cal_Optimisation.old.dat", "mine", true},
+      {"cal.1_Sensitivity.dat", "", false},
+      {"cal_Band_2.csv", "", false},
+      {"cal_Band_2.1.csv", "", false},
+      {"cal_Report.html", "", false},
+      {"cal_Series.dat", "", false},
+      {"cal._spi_", "", false},
+      {"calSimErr.1.dat", "", false},
+      {"cal.log", "Warning: early\nMirevo 1.2, started\n", false},
+      {"cal.2.dat", "# Title\n# Mirevo 1.2\n", false},
+      {"cal.dat", "initial storages\n", true},  // the model's, as their content shows
+      {"cal.1.log", "", true},
+      {"cal.txt", "Mirevo ", true},
+      {"in/calSimErr.dat", "mine", true},  // no setup beside it
+  };
+  for (const auto& file : files) folder.write(file.name, file.content);
   for (int round = 0; round < 2; ++round)
     makeProcessFolder(folder.path(), folder / "cal_Process1", folder / "cal_Process");
 
@@ -107,12 +134,21 @@ TEST(ProcessFolder, NeverCopiesWhatRunsMake) {
   EXPECT_FALSE(folder.exists("cal_Process1/cal_Process1"));
   EXPECT_FALSE(folder.exists("cal_Process1/cal_Process2"));
   EXPECT_FALSE(folder.exists("cal_Process1/other_Process1"));
-  EXPECT_FALSE(folder.exists("cal_Process1/cal_Saved"));
-  EXPECT_FALSE(folder.exists("cal_Process1/cal_Saved.12"));
-  EXPECT_TRUE(folder.exists("cal_Process1/cal_Saved.old/data.txt"));
-  EXPECT_TRUE(folder.exists("cal_Process1/my_Saved/data.txt"));
   EXPECT_TRUE(folder.exists("cal_Process1/my_Process1/data.txt"));
   EXPECT_TRUE(folder.exists("cal_Process1/cal_Processes/data.txt"));
+  EXPECT_FALSE(folder.exists("cal_Process1/in/deep/cal_Saved"));
+  for (const auto& file : files) {
+    EXPECT_EQ(folder.exists(std::string("cal_Process1/") + file.name), file.isCopied) << file.name;
+  }
+}
+
+TEST(ProcessFolder, KnowsItsOwnBehindALink) {
+  const TemporaryFolder folder;
+  folder.write("base/scratch/cal_Process2/run.sh", "");
+  fs::create_directory_symlink(folder / "base/scratch", folder / "link");
+  makeProcessFolder(folder / "base", folder / "link/cal_Process1", folder / "link/cal_Process");
+  EXPECT_TRUE(folder.exists("link/cal_Process1/scratch"));
+  EXPECT_TRUE(fs::is_empty(folder / "link/cal_Process1/scratch"));
 }
 
 TEST(ProcessFolder, NamesThePathThatCannotBeCopied) {
