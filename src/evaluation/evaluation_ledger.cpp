@@ -39,6 +39,7 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
   }
   observer_.message(withNumber(outcome, result.number));
   observer_.evaluationFinished(sets_[place], result);
+  result.shownSeries = {};  // a batch keeps its results to its end
   if (!result.ok()) failedRuns_.countFailure(result.number, *result.failure);
   results_[place] = std::move(result);
   ++finishedCount_;

@@ -147,6 +147,9 @@ const std::vector<KeywordRow>& rows() {
        MIREVO_FIELD(c.simulationOption)},
       {kOption, "Title", Type::text, "''", kAny, "", "Title of the run, in the log and the result files.",
        MIREVO_FIELD(c.title)},
+      {kOption, "Report", Type::integer, "1", kAny, "",
+       "1: a report for the browser is written at the end of the run, as `<setup>_Report.html`. 0: none.",
+       MIREVO_FIELD(c.writesReport)},
       countOf(kBatch),
       {kBatchItem, "BatchFileName", Type::fileName, "", kAny, "",
        "Runs the model. Its folder in the first item is the base folder, in or below which all files of the model lie. "

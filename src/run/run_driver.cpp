@@ -6,13 +6,16 @@
 
 #include <fmt/format.h>
 
+#include "common/calendar.h"
 #include "common/fatal_error.h"
 #include "common/text.h"
 #include "evaluation/local_evaluator.h"
 #include "evaluation/mpi_evaluator.h"
+#include "measures/period_series.h"
 #include "platform/posix_process_launcher.h"
 #include "run/mpi_start.h"
 #include "run/run_model.h"
+#include "run/run_report.h"
 #include "run/setup_reader.h"
 #include "run/setup_summary.h"
 #include "run/setup_warnings.h"
@@ -141,6 +144,7 @@ void RunDriver::openResults() {
     state_.log.line("The saved output files of the earlier run were kept as " + kept);
   }
   reporter_ = std::make_unique<RunReporter>(state_, results_, *failedRunFile_, space);
+  openSeries();
   failedRunPolicy_.emplace(config_.plannedEvaluations());
   if (state_.mpiInUse) {
     evaluator_ = std::make_unique<MpiEvaluator>(*runner_, state_.mpi, *reporter_, *failedRunPolicy_);
@@ -170,6 +174,23 @@ void RunDriver::openResultFile() {
   results_.open(path, head, columns);
 }
 
+void RunDriver::openSeries() {
+  const std::string path = filePrefix_ + "_Series.dat";
+  keepEarlierFile(path);
+  if (runner_->shownMeasures().empty()) return;
+  RecordedSeries run;
+  run.headLines = {
+      columnName(config_.title), fmt::format("Mirevo {}", programVersion()), "Setup file: " + config_.setupFile,
+      fmt::format("Evaluation period: {} to {}", formatDate(config_.period.start), formatDate(config_.period.end))};
+  run.measures = seriesNames(config_.measures, runner_->shownMeasures());
+  run.observations = runner_->readShownObservations();
+  run.periodFirst = secondNumber(config_.period.start);
+  run.periodLast = secondNumber(config_.period.end);
+  series_ = std::make_unique<SeriesRecorder>(path, std::move(run), runTimeClock,
+                                             [this](std::string_view text) { state_.log.warning(text); });
+  reporter_->recordSeries(*series_);
+}
+
 std::vector<std::string> RunDriver::closingLines(std::string_view terminationMessage) const {
   std::vector<std::string> lines{std::string(terminationMessage)};
   if (!reporter_ || !reporter_->best()) return lines;
@@ -186,9 +207,18 @@ std::vector<std::string> RunDriver::closingLines(std::string_view terminationMes
 bool RunDriver::closeResults(std::string_view terminationMessage, std::string& reason,
                              std::span<const std::string> report) {
   if (reporter_) reporter_->settle(*aggregator_);
+  if (series_) series_->finish(reporter_->best());
   std::vector<std::string> lines = closingLines(terminationMessage);
   lines.insert(lines.end(), report.begin(), report.end());
   return results_.finish(lines, reason);
+}
+
+void RunDriver::reportRun(RunStateShown state, std::string_view message) {
+  if (!config_.writesReport || results_.path().empty()) return;
+  std::string reason;
+  if (!writeReport(config_, filePrefix_, RunEnding{state, std::string(message)}, reason)) {
+    state_.log.warning("The report cannot be written: " + reason);
+  }
 }
 
 void RunDriver::finish(const TaskOutcome& outcome) {
@@ -196,6 +226,7 @@ void RunDriver::finish(const TaskOutcome& outcome) {
   if (!closeResults(outcome.terminationMessage, reason, outcome.report)) {
     fatalError("Error: Unable to write to " + results_.path(), reason);
   }
+  reportRun(RunStateShown::finished, outcome.terminationMessage);
   state_.log.line("");
   state_.log.line(
       fmt::format("{} model evaluations, {} of them failed", reporter_->evaluationCount(), reporter_->failedCount()));
@@ -220,7 +251,9 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
     showMessage(text);
   }
   std::string reason;
-  closeResults(message, reason);  // the run has failed already, with the first reason
+  closeResults(message, reason);              // the run has failed already, with the first reason
+  if (launcher_) launcher_->haltProcesses();  // no model waits for the report
+  reportRun(RunStateShown::failed, text);
   return endEarly(message);
 }
 
@@ -230,6 +263,8 @@ int RunDriver::endCancelled(std::string_view message) {
   if (!closeResults(message, reason)) {
     state_.log.line(fmt::format("Error: Unable to write to {}\n{}", results_.path(), reason));
   }
+  if (launcher_) launcher_->haltProcesses();
+  reportRun(RunStateShown::cancelled, message);
   return endEarly(message);
 }
 

@@ -1,5 +1,6 @@
 #include "run/run_reporter.h"
 
+#include <algorithm>
 #include <cmath>
 
 #include "common/fatal_error.h"
@@ -31,6 +32,10 @@ void RunReporter::evaluationFinished(std::span<const double> set, const Evaluati
     unsettled_.push_back({result.number, values, result.objectiveValues});
   } else if (!result.objectiveValues.empty()) {
     considerAsBest(result.number, result.aggregate, values);
+  }
+  if (recorder_ != nullptr) {
+    const bool isInitial = std::equal(set.begin(), set.end(), space_.initial.begin(), space_.initial.end());
+    recorder_->evaluationFinished(result, values, isInitial, best_);
   }
   state_.progress.progressStep();
   if (!state_.log.writeError().empty()) {

@@ -8,9 +8,11 @@
 #include "evaluation/evaluation_observer.h"
 #include "measures/objective_functions.h"
 #include "parameters/search_space.h"
+#include "run/best_evaluation.h"
 #include "run/failed_run_file.h"
 #include "run/result_file.h"
 #include "run/run_state.h"
+#include "run/series_recorder.h"
 
 namespace mirevo {
 
@@ -19,6 +21,9 @@ class RunReporter final : public EvaluationObserver {
  public:
   /// The result file is open; all must outlive the reporter.
   RunReporter(RunState& state, ResultFile& results, FailedRunFile& failedRuns, const SearchSpace& space);
+
+  /// Has the series of the initial and the best evaluation recorded from here on; `recorder` must outlive the reporter.
+  void recordSeries(SeriesRecorder& recorder) { recorder_ = &recorder; }
 
   void message(std::string_view text) override;
   void warning(std::string_view text) override;
@@ -35,11 +40,7 @@ class RunReporter final : public EvaluationObserver {
 
   /// The best of the search; without one the evaluation with the smallest aggregate, of equals that with the smallest
   /// number.
-  struct Best {
-    int number = 0;
-    double aggregate = 0.0;
-    std::vector<double> parameterValues;  ///< model scale, one a variable parameter
-  };
+  using Best = BestEvaluation;
   const std::optional<Best>& best() const { return best_; }
 
   int evaluationCount() const { return evaluationCount_; }
@@ -58,6 +59,7 @@ class RunReporter final : public EvaluationObserver {
   ResultFile& results_;
   FailedRunFile& failedRuns_;
   const SearchSpace& space_;
+  SeriesRecorder* recorder_ = nullptr;
   std::optional<Best> best_;
   bool isBestOfSearch_ = false;
   std::vector<Unsettled> unsettled_;

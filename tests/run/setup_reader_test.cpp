@@ -150,6 +150,7 @@ TEST_F(SetupReaderTest, EchoesEverySectionAndValueInReadingOrder) {
                                        "[MIREVO_SIMULATION_OPTION]\n"
                                        "  Option = 2\n"
                                        "  Title = 'Upper catchment'\n"
+                                       "  Report = 1 (default)\n"
                                        "[MIREVO_SIMULATION_OPTION/SIMBATCH]\n"
                                        "  TqSEKdxListItemCount = 1\n"
                                        "[MIREVO_SIMULATION_OPTION/SIMBATCH/SIMBATCHITEM_1]\n"
