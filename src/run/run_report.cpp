@@ -177,12 +177,13 @@ void ReportBuilder::addRun() {
   run.started = valueOf(table_.headLines, "Started: ");
   run.reportMade = dateAndTimeNow();
   run.planned = config_.plannedEvaluations();
+  const bool isSearch = config_.simulationOption == SimulationOption::parameterOptimisation;
+  if (isSearch) ++run.planned;  // the final model run with the best set has a number, too
   run.aggregation = config_.aggregationMethod == AggregationMethod::zero
                         ? "every aggregate is 0"
                         : aggregationMethodName(config_.aggregationMethod);
   run.periodStart = formatDate(config_.period.start);
   run.periodEnd = formatDate(config_.period.end);
-  const bool isSearch = config_.simulationOption == SimulationOption::parameterOptimisation;
   if (isSearch || config_.simulationOption == SimulationOption::uncertaintyAnalysis) run.seed = config_.randomSeed;
   if (!isSearch) return;
   const OptimisationConfig& search = config_.optimisation;

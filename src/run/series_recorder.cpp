@@ -2,7 +2,10 @@
 
 #include <algorithm>
 #include <cmath>
+#include <exception>
 #include <utility>
+
+#include <fmt/format.h>
 
 #include "report/report_file.h"
 
@@ -102,8 +105,17 @@ void SeriesRecorder::follow(const std::optional<BestEvaluation>& best, const Hel
 }
 
 void SeriesRecorder::finish(const std::optional<BestEvaluation>& best) {
-  follow(best, nullptr);
-  if (isChanged_) write();
+  try {
+    follow(best, nullptr);
+    if (isChanged_) write();
+  } catch (const std::exception& error) {  // out of memory: the run's own ending goes on
+    warn(error.what());
+  }
+}
+
+void SeriesRecorder::warn(std::string_view reason) {
+  if (std::exchange(hasWarned_, true)) return;
+  warn_(fmt::format("The series of the best evaluation cannot be written to {}: {}", path_, reason));
 }
 
 void SeriesRecorder::write() {
@@ -115,9 +127,7 @@ void SeriesRecorder::write() {
   if (best_) table.best = best_->evaluation;
   for (std::size_t i = 0; i < run_.measures.size(); ++i) table.series.push_back(shownSeries(i));
   std::string reason;
-  if (!replaceFile(path_, seriesTableText(table), reason) && !std::exchange(hasWarned_, true)) {
-    warn_("The series of the best evaluation cannot be written to " + path_ + ": " + reason);
-  }
+  if (!replaceFile(path_, seriesTableText(table), reason)) warn(reason);
   isChanged_ = false;
   const double ended = clock_();
   nextWrite_ = ended + std::max(kLeastSecondsBetween, (ended - begun) / kShareOfWriting);

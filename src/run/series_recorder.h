@@ -39,7 +39,7 @@ class SeriesRecorder final {
   void evaluationFinished(const EvaluationResult& result, std::span<const double> values, bool hasInitialParameters,
                           const std::optional<BestEvaluation>& best);
 
-  /// At the run's end: writes what is not written yet. `best` is the run's best evaluation.
+  /// At the run's end: writes what is not written yet, and never throws. `best` is the run's best evaluation.
   void finish(const std::optional<BestEvaluation>& best);
 
  private:
@@ -53,6 +53,7 @@ class SeriesRecorder final {
   void holdUnsettled(const EvaluationResult& result, std::span<const double> values);
   void follow(const std::optional<BestEvaluation>& best, const Held* finished);
   void write();
+  void warn(std::string_view reason);
   ShownSeries shownSeries(std::size_t pair) const;
 
   std::string path_;

@@ -34,7 +34,7 @@ TEST(Report, StandsBesideTheResultsHoweverARunEnds) {
       {{.maxEvaluations = 30},
        0,
        {R"("state":"finished","message":"Optimisation terminated: Maximum number of)",
-        R"("evaluations":31,"planned":30)", R"({"name":"b","kind":"variable")", R"("start":1,"best":)",
+        R"("evaluations":31,"planned":31)", R"({"name":"b","kind":"variable")", R"("start":1,"best":)",
         R"("series":[{"measure":"flow")", R"("step":86400000)", R"("figures":{"initial":{"n":365,"nse":)",
         R"("initialNumber":1,"initialLabel":"initial parameters")"}},
       {{.option = 0, .scenarios = {"5, 2, 1", "1, 2, 1"}, .modelArguments = "--fail-above 4.5"},
