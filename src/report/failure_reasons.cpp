@@ -52,7 +52,8 @@ std::vector<FailureReason> readFailureReasons(std::string_view text, std::string
       for (std::size_t k = i + 2; k < lines.size() && !lines[k].empty(); ++k) {
         if (lines[k].starts_with(kOutput)) output.push_back(lines[k].substr(kOutput.size()));
       }
-      const std::string_view number = lines[i].substr(kEvaluation.size());
+      const std::string_view heading = lines[i].substr(kEvaluation.size());
+      const std::string_view number = heading.substr(0, heading.find(' '));  // its kind may stand behind it
       reasons.push_back({std::string(reason), 0, exampleOf(number, reason, std::move(output))});
     }
     ++reasons[place->second].count;

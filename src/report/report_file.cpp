@@ -55,7 +55,7 @@ std::string reportPage(std::string_view page, const ReportData& data) {
   return text;
 }
 
-bool replaceFile(const std::string& path, std::string_view text, std::string& reason) {
+bool writeWhole(const std::string& path, std::string_view text, std::string& reason) {
   const std::string temporary = path + ".tmp";
   const mode_t mask = ::umask(0);
   ::umask(mask);

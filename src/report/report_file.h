@@ -12,6 +12,6 @@ std::string reportPage(std::string_view page, const ReportData& data);
 
 /// Writes text to a file that is there whole or not at all: beside it first, then renamed over what there was. False,
 /// with the system's reason, when that fails.
-bool replaceFile(const std::string& path, std::string_view text, std::string& reason);
+bool writeWhole(const std::string& path, std::string_view text, std::string& reason);
 
 }  // namespace mirevo

@@ -395,7 +395,7 @@ bool writeReport(const RunConfig& config, const std::string& filePrefix, const s
                  std::string& reason) noexcept {
   try {
     const std::optional<ReportData> data = buildReport(config, filePrefix, ending, reason);
-    return data && replaceFile(filePrefix + "_Report.html", reportPage(reportPageTemplate(), *data), reason);
+    return data && writeWhole(filePrefix + "_Report.html", reportPage(reportPageTemplate(), *data), reason);
   } catch (const FatalError& error) {
     reason = error.message() + "\n" + error.detail();
   } catch (const std::exception& error) {

@@ -127,7 +127,7 @@ void SeriesRecorder::write() {
   if (best_) table.best = best_->evaluation;
   for (std::size_t i = 0; i < run_.measures.size(); ++i) table.series.push_back(shownSeries(i));
   std::string reason;
-  if (!replaceFile(path_, seriesTableText(table), reason)) warn(reason);
+  if (!writeWhole(path_, seriesTableText(table), reason)) warn(reason);
   isChanged_ = false;
   const double ended = clock_();
   nextWrite_ = ended + std::max(kLeastSecondsBetween, (ended - begun) / kShareOfWriting);

@@ -23,7 +23,7 @@ Evaluation No. 3
    | one
    | two
 
-Evaluation No. 7
+Evaluation No. 7 (results not readable)
    /x/basin_Process2/out.csv: Evaluation No. 1
    a = 2
 
