@@ -59,9 +59,13 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
   observer_.message(withNumber(outcome, result.number));
   if (earlier_ != nullptr) {
     // A repeated run has its row already, which stands.
-    if (auto known = earlier_->take(result.number, sets_[place])) return replay(place, std::move(*known));
+    if (auto known = earlier_->take(result.number, sets_[place])) {
+      known->shownSeries = std::move(result.shownSeries);
+      return replay(place, std::move(*known));
+    }
   }
   observer_.evaluationFinished(sets_[place], result);
+  result.shownSeries = {};  // a batch keeps its results to its end
   store(place, std::move(result));
 }
 

@@ -7,6 +7,8 @@
 #include <string_view>
 #include <vector>
 
+#include "measures/period_series.h"
+
 namespace mirevo {
 
 /// Every measure, objective function and aggregate of a failed evaluation: worse than any real result.
@@ -55,6 +57,9 @@ struct EvaluationResult {
   /// Where the task asks for them: the simulated values at the observation times of ModelRunner::observedSeries(), one
   /// series after another, NaN where the model has none. Empty for a failed evaluation.
   std::vector<double> simulatedValues;
+  /// Of an evaluation that may be shown as the initial or the best one: its simulated series, one a pair of
+  /// ModelRunner::shownMeasures(). Empty for all others, and when the evaluation was reported.
+  std::vector<PeriodSeries> shownSeries;
   std::optional<EvaluationFailure> failure;
   std::vector<UnusedObservations> unusedObservations;
   std::vector<std::string> warnings;  ///< what the log should say of the run, one line each

@@ -87,10 +87,12 @@ ModelRunner::ModelRunner(ModelDescription description, ParameterModel& parameter
       parameters_(parameters),
       aggregator_(aggregator),
       launcher_(launcher),
-      processFolderPrefix_(launcherSettings.processFolderPrefix) {
+      processFolderPrefix_(launcherSettings.processFolderPrefix),
+      shownRuns_(parameters.searchSpace().initial) {
   requireFilesInBaseFolder();
   const std::vector<std::string> converted = readTemplates();
   series_ = SeriesTables::MirevoTSobjectInit(description_.measures, description_.period);
+  shownMeasures_ = measuresOfDistinctPairs(description_.measures);
   savedFiles_ = SavedFiles(description_.savedFiles, description_.baseFolder, description_.savedFolder);
   for (std::size_t i = 0; i < description_.measures.size() && description_.keepSimulatedValues; ++i) {
     const OutputMeasure& measure = description_.measures[i];
@@ -180,6 +182,7 @@ std::optional<EvaluationFailure> ModelRunner::prepareModelRun(std::span<const do
       updateResistanceNumbers(path);
     }
   }
+  shownRuns_.begin(slot, set);
   launcher_.createProcesses(slot);
   return std::nullopt;
 }
@@ -191,6 +194,27 @@ void ModelRunner::updateResistanceNumbers(const std::string& path) {
 }
 
 EvaluationResult ModelRunner::collect(int slot) {
+  EvaluationResult result = judge(slot);
+  if (result.ok() && shownRuns_.mayBeShown(slot, result.aggregate)) {
+    for (const std::size_t i : shownMeasures_) {
+      result.shownSeries.push_back(
+          readPeriodSeries(series_.simulation(i), description_.measures[i].simulation, description_.period));
+    }
+  }
+  series_.releaseSimulationFiles();
+  return result;
+}
+
+std::vector<PeriodSeries> ModelRunner::readShownObservations() {
+  std::vector<PeriodSeries> observations;
+  for (const std::size_t i : shownMeasures_) {
+    observations.push_back(
+        readPeriodSeries(series_.observation(i), description_.measures[i].observation, description_.period));
+  }
+  return observations;
+}
+
+EvaluationResult ModelRunner::judge(int slot) {
   EvaluationResult result;
   result.measureValues.assign(description_.measures.size(), std::nan(""));
   auto failure = findBatchFailure(slot);
@@ -303,7 +327,6 @@ std::optional<EvaluationFailure> ModelRunner::readMeasures(int slot, EvaluationR
     appendSimulatedValues(observed, description_.measures[observed.measure], series_.simulation(observed.measure),
                           result.simulatedValues);
   }
-  series_.releaseSimulationFiles();
   return failure;
 }
 

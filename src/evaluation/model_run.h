@@ -7,6 +7,7 @@
 
 #include "evaluation/evaluation_result.h"
 #include "evaluation/saved_files.h"
+#include "evaluation/shown_runs.h"
 #include "measures/measure_statistics.h"
 #include "measures/objective_functions.h"
 #include "measures/observed_series.h"
@@ -69,6 +70,10 @@ class ModelRunner final {
   ProcessLauncher& launcher() { return launcher_; }
   /// The observations of every measure of interface type 0; empty unless simulated values are kept.
   const std::vector<ObservedSeries>& observedSeries() const { return observedSeries_; }
+  /// The measures whose simulated series results may hold, 0-based: one a pair of series that is compared.
+  const std::vector<std::size_t>& shownMeasures() const { return shownMeasures_; }
+  /// The observed series of each of them.
+  std::vector<PeriodSeries> readShownObservations();
   const std::vector<ParameterTemplate>& templates() const { return templates_; }
 
  private:
@@ -84,9 +89,10 @@ class ModelRunner final {
   std::vector<std::string> readTemplates();
   std::string slotPath(const std::string& baseFile, int slot) const;
   void updateResistanceNumbers(const std::string& path);
+  EvaluationResult judge(int slot);
   std::optional<EvaluationFailure> findBatchFailure(int slot) const;
   std::optional<EvaluationFailure> findMissingResults(int slot) const;
-  /// Fills in the measure and simulated values, unless what the model wrote cannot be used.
+  /// Fills in the measure and simulated values and leaves the series open, unless what the model wrote cannot be used.
   std::optional<EvaluationFailure> readMeasures(int slot, EvaluationResult& result);
   std::optional<EvaluationFailure> readSeriesMeasure(int slot, std::size_t measure, EvaluationResult& result);
   void noteUnusedObservations(std::size_t measure, const MeasureStatistics& statistics, EvaluationResult& result) const;
@@ -101,6 +107,8 @@ class ModelRunner final {
   SeriesTables series_;
   SavedFiles savedFiles_;
   std::vector<ObservedSeries> observedSeries_;
+  std::vector<std::size_t> shownMeasures_;
+  ShownRuns shownRuns_;
   std::vector<SlotFiles> slots_;
 };
 

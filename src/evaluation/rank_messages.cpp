@@ -44,8 +44,12 @@ template <>
 struct Layout<EvaluationResult> {
   static void of(auto& archive, auto& result) {
     archive(result.measureValues, result.objectiveValues, result.aggregate, result.simulatedValues, result.failure,
-            result.unusedObservations, result.warnings);
+            result.unusedObservations, result.warnings, result.shownSeries);
   }
+};
+template <>
+struct Layout<PeriodSeries> {
+  static void of(auto& archive, auto& series) { archive(series.seconds, series.values); }
 };
 template <>
 struct Layout<EvaluationFailure> {

@@ -13,6 +13,7 @@
 #include "algorithms/local_sensitivity.h"
 #include "algorithms/series_band.h"
 #include "algorithms/uncertainty.h"
+#include "measures/period_series.h"
 #include "run/band_file.h"
 
 namespace mirevo {
@@ -47,14 +48,6 @@ std::vector<std::string> reportBands(const TaskContext& context, std::span<const
     lines.push_back("   " + path);
   }
   return lines;
-}
-
-/// Whether two measures compare the same two series.
-bool isSamePair(const OutputMeasure& a, const OutputMeasure& b) {
-  const auto isSame = [](const SeriesReference& left, const SeriesReference& right) {
-    return left.fileName == right.fileName && left.itemNo == right.itemNo;
-  };
-  return isSame(a.simulation, b.simulation) && isSame(a.observation, b.observation);
 }
 
 /// What the covariance is computed from: one entry an observation, and one row of simulated values a set.

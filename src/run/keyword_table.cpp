@@ -159,6 +159,9 @@ const std::vector<KeywordRow>& rows() {
        "Of so many failed model runs, the first ones, the process folder is kept as `<setup>_Failed<evaluation "
        "number>`.",
        MIREVO_FIELD(c.failedRunFolders), kNotOfResults},
+      {kOption, "Report", Type::integer, "1", kAny, "",
+       "1: a report for the browser is written at the end of the run, as `<setup>_Report.html`. 0: none.",
+       MIREVO_FIELD(c.writesReport), kNotOfResults},
       countOf(kBatch),
       {kBatchItem, "BatchFileName", Type::fileName, "", kAny, "",
        "Runs the model. Its folder in the first item is the base folder, in or below which all files of the model lie. "

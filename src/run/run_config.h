@@ -70,6 +70,7 @@ struct RunConfig {
 
   SimulationOption simulationOption = SimulationOption::scenarioRuns;
   std::string title;
+  bool writesReport = true;  ///< at the end of the run
   std::vector<BatchItem> batchItems;
   std::string baseFolder;  ///< the folder of the first batch file
   std::vector<ParameterFileItem> parameterFiles;

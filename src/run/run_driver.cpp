@@ -6,14 +6,17 @@
 
 #include <fmt/format.h>
 
+#include "common/calendar.h"
 #include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/text.h"
 #include "evaluation/local_evaluator.h"
 #include "evaluation/mpi_evaluator.h"
+#include "measures/period_series.h"
 #include "platform/posix_process_launcher.h"
 #include "run/mpi_start.h"
 #include "run/run_model.h"
+#include "run/run_report.h"
 #include "run/setup_reader.h"
 #include "run/setup_summary.h"
 #include "run/setup_warnings.h"
@@ -156,6 +159,7 @@ void RunDriver::openResults() {
   signalState.resultFileDescriptor = results_->table().descriptor();
   reporter_ = std::make_unique<RunReporter>(state_, results_->table(), results_->failedRuns(),
                                             parameters_->searchSpace(), results_->simulatedValues());
+  openSeries();
   failedRunPolicy_.emplace(config_.plannedEvaluations(), config_.failedRunFolders);
   EarlierEvaluations* const earlier = results_->earlierEvaluations();
   if (state_.mpiInUse) {
@@ -164,6 +168,26 @@ void RunDriver::openResults() {
     evaluator_ = std::make_unique<LocalEvaluator>(*runner_, *reporter_, *failedRunPolicy_,
                                                   config_.simultaneousSimulations, earlier);
   }
+}
+
+void RunDriver::openSeries() {
+  const std::string path = filePrefix_ + "_Series.dat";
+  const bool goesOn = results_->earlierEvaluations() != nullptr;
+  if (!goesOn) keepEarlierFile(path);
+  if (runner_->shownMeasures().empty()) return;
+  RecordedSeries run;
+  run.headLines = {
+      columnName(config_.title), fmt::format("Mirevo {}", programVersion()), "Setup file: " + config_.setupFile,
+      fmt::format("Evaluation period: {} to {}", formatDate(config_.period.start), formatDate(config_.period.end))};
+  run.measures = seriesNames(config_.measures, runner_->shownMeasures());
+  run.observations = runner_->readShownObservations();
+  run.periodFirst = secondNumber(config_.period.start);
+  run.periodLast = secondNumber(config_.period.end);
+  series_ = std::make_unique<SeriesRecorder>(path, std::move(run), runTimeClock,
+                                             [this](std::string_view text) { state_.log.warning(text); });
+  std::string reason;
+  if (goesOn) series_->resume(readTextFile(path, reason).value_or(std::string{}));
+  reporter_->recordSeries(*series_);
 }
 
 std::vector<std::string> RunDriver::closingLines(std::string_view terminationMessage) const {
@@ -184,6 +208,7 @@ std::vector<std::string> RunDriver::closingLines(std::string_view terminationMes
 bool RunDriver::closeResults(std::string_view terminationMessage, std::string& reason,
                              std::span<const std::string> report) {
   if (reporter_) reporter_->settle(*aggregator_);
+  if (series_) series_->finish(reporter_->best());
   std::vector<std::string> lines = closingLines(terminationMessage);
   lines.insert(lines.end(), report.begin(), report.end());
   const EndingSignalsHeld held;
@@ -191,11 +216,20 @@ bool RunDriver::closeResults(std::string_view terminationMessage, std::string& r
   return !results_ || results_->table().finish(lines, reason);
 }
 
+void RunDriver::reportRun(RunStateShown state, std::string_view message) {
+  if (!config_.writesReport || !results_ || results_->table().path().empty()) return;
+  std::string reason;
+  if (!writeReport(config_, filePrefix_, RunEnding{state, std::string(message)}, reason)) {
+    state_.log.warning("The report cannot be written: " + reason);
+  }
+}
+
 void RunDriver::finish(const TaskOutcome& outcome) {
   std::string reason;
   if (!closeResults(outcome.terminationMessage, reason, outcome.report)) {
     fatalError("Error: Unable to write to " + results_->table().path(), reason);
   }
+  reportRun(RunStateShown::finished, outcome.terminationMessage);
   state_.log.line("");
   const int count = reporter_->evaluationCount();
   state_.log.line(count == 1 ? fmt::format("1 model evaluation, {} failed", reporter_->failedCount())
@@ -234,7 +268,9 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
     showMessage(text);
   }
   std::string reason;
-  closeResults(message, reason);  // the run has failed already, with the first reason
+  closeResults(message, reason);              // the run has failed already, with the first reason
+  if (launcher_) launcher_->haltProcesses();  // no model waits for the report
+  reportRun(RunStateShown::failed, text);
   return endEarly(message);
 }
 
@@ -244,6 +280,8 @@ int RunDriver::endCancelled(std::string_view message) {
   if (!closeResults(message, reason)) {
     state_.log.line(fmt::format("Error: Unable to write to {}\n{}", results_->table().path(), reason));
   }
+  if (launcher_) launcher_->haltProcesses();
+  reportRun(RunStateShown::cancelled, message);
   return endEarly(message);
 }
 

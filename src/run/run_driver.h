@@ -12,11 +12,13 @@
 #include "measures/objective_functions.h"
 #include "parameters/parameter_model.h"
 #include "platform/process_launcher.h"
+#include "report/report_data.h"
 #include "run/run_config.h"
 #include "run/run_lock.h"
 #include "run/run_reporter.h"
 #include "run/run_results.h"
 #include "run/run_state.h"
+#include "run/series_recorder.h"
 #include "run/tasks.h"
 
 namespace mirevo {
@@ -38,9 +40,12 @@ class RunDriver final {
   void buildModel();
   void logSetup();
   void openResults();
+  void openSeries();
   /// False, with the system's reason, when the results could not be brought to their end. `report`: what the task
   /// found.
   bool closeResults(std::string_view terminationMessage, std::string& reason, std::span<const std::string> report = {});
+  /// The report of what was done, where there is anything and the setup wants it. What goes wrong with it is a warning.
+  void reportRun(RunStateShown state, std::string_view message);
   void finish(const TaskOutcome& outcome);
   void logFailures();
   int endInError(std::string_view message, std::string_view detail);
@@ -58,6 +63,7 @@ class RunDriver final {
   std::unique_ptr<ParameterModel> parameters_;
   std::unique_ptr<ObjectiveAggregator> aggregator_;
   std::optional<RunResults> results_;
+  std::unique_ptr<SeriesRecorder> series_;
   std::unique_ptr<RunReporter> reporter_;
   std::optional<FailedRunPolicy> failedRunPolicy_;
   std::unique_ptr<ProcessLauncher> launcher_;

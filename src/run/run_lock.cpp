@@ -5,6 +5,7 @@
 #include <sys/file.h>
 #include <unistd.h>
 
+#include "common/descriptor.h"
 #include "platform/front_end.h"
 
 namespace mirevo {
@@ -24,6 +25,12 @@ bool RunLock::take(const std::string& setupFile, double patienceSeconds) {
     ::usleep(50'000);
   }
   return true;
+}
+
+bool RunLock::isHeld(const std::string& setupFile) {
+  const Descriptor file(::open(setupFile.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
+  // A shared lock for a moment: a run that begins meanwhile tries again.
+  return file.get() >= 0 && ::flock(file.get(), LOCK_SH | LOCK_NB) != 0 && errno == EWOULDBLOCK;
 }
 
 }  // namespace mirevo

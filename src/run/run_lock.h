@@ -17,6 +17,9 @@ class RunLock final {
   /// another run holds it. A file that cannot be read or locked counts as taken by nobody: reading it says more.
   bool take(const std::string& setupFile, double patienceSeconds);
 
+  /// Whether a run of the setup file is going on just now. Asks without taking the lock from a run that begins.
+  static bool isHeld(const std::string& setupFile);
+
  private:
   int descriptor_ = -1;
 };

@@ -1,5 +1,6 @@
 #include "run/run_reporter.h"
 
+#include <algorithm>
 #include <cmath>
 
 #include "common/fatal_error.h"
@@ -27,13 +28,16 @@ void RunReporter::evaluationFinished(std::span<const double> set, const Evaluati
   results_.addRow(values, result);
   if (!result.ok()) state_.log.line("   " + result.failure->reason);  // below the message that it failed
   count(values, result, dateAndTimeWithZone());
+  recordSeries(set, values, result);
   state_.progress.progressStep();
   requireLogWritten();
 }
 
 void RunReporter::evaluationReplayed(std::span<const double> set, const EvaluationResult& result) {
   ++replayedCount_;
-  count(ToModelScale(space_, set), result, {});
+  const std::vector<double> values = ToModelScale(space_, set);
+  count(values, result, {});
+  if (!result.shownSeries.empty()) recordSeries(set, values, result);
   state_.progress.progressReplayed();
 }
 
@@ -49,6 +53,13 @@ void RunReporter::count(const std::vector<double>& parameterValues, const Evalua
   } else if (!result.objectiveValues.empty()) {
     considerAsBest(result.number, result.aggregate, parameterValues, foundAt);
   }
+}
+
+void RunReporter::recordSeries(std::span<const double> set, const std::vector<double>& values,
+                               const EvaluationResult& result) {
+  if (recorder_ == nullptr) return;
+  const bool isInitial = std::equal(set.begin(), set.end(), space_.initial.begin(), space_.initial.end());
+  recorder_->evaluationFinished(result, values, isInitial, best_);
 }
 
 void RunReporter::requireLogWritten() const {

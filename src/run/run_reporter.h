@@ -8,10 +8,12 @@
 #include "evaluation/evaluation_observer.h"
 #include "measures/objective_functions.h"
 #include "parameters/search_space.h"
+#include "run/best_evaluation.h"
 #include "run/failed_run_file.h"
 #include "run/failure_summary.h"
 #include "run/result_file.h"
 #include "run/run_state.h"
+#include "run/series_recorder.h"
 #include "run/simulated_values_file.h"
 
 namespace mirevo {
@@ -23,6 +25,9 @@ class RunReporter final : public EvaluationObserver {
   /// `simulatedValues`: takes those of every evaluation; may be null.
   RunReporter(RunState& state, ResultFile& results, FailedRunFile& failedRuns, const SearchSpace& space,
               SimulatedValuesFile* simulatedValues = nullptr);
+
+  /// Has the series of the initial and the best evaluation recorded from here on; `recorder` must outlive the reporter.
+  void recordSeries(SeriesRecorder& recorder) { recorder_ = &recorder; }
 
   void message(std::string_view text) override;
   void warning(std::string_view text) override;
@@ -40,11 +45,7 @@ class RunReporter final : public EvaluationObserver {
 
   /// The best of the search; without one the evaluation with the smallest aggregate, of equals that with the smallest
   /// number.
-  struct Best {
-    int number = 0;
-    double aggregate = 0.0;
-    std::vector<double> parameterValues;  ///< model scale, one a variable parameter
-  };
+  using Best = BestEvaluation;
   const std::optional<Best>& best() const { return best_; }
 
   int evaluationCount() const { return evaluationCount_; }
@@ -60,6 +61,8 @@ class RunReporter final : public EvaluationObserver {
     std::vector<double> parameterValues;
     std::vector<double> objectiveValues;
   };
+  /// `values`: the set on the model scale.
+  void recordSeries(std::span<const double> set, const std::vector<double>& values, const EvaluationResult& result);
   void count(const std::vector<double>& parameterValues, const EvaluationResult& result, std::string_view foundAt);
   void considerAsBest(int number, double aggregate, const std::vector<double>& parameterValues,
                       std::string_view foundAt);
@@ -70,6 +73,7 @@ class RunReporter final : public EvaluationObserver {
   FailedRunFile& failedRuns_;
   const SearchSpace& space_;
   SimulatedValuesFile* simulatedValues_;
+  SeriesRecorder* recorder_ = nullptr;
   std::optional<Best> best_;
   bool isBestOfSearch_ = false;
   std::vector<Unsettled> unsettled_;

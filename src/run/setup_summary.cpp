@@ -28,23 +28,6 @@ std::string_view operatorName(std::int32_t logicalOperator) {
   return logicalOperator >= 0 && logicalOperator <= 3 ? kNames[logicalOperator] : "?";
 }
 
-std::string_view statisticName(const OutputMeasure& measure) {
-  if (measure.interfaceType == InterfaceType::measureFile) return "written by the model";
-  switch (measure.statisticType) {
-    case StatisticType::mean:
-      return "mean";
-    case StatisticType::rootMeanSquare:
-      return "root mean square";
-    case StatisticType::standardDeviation:
-      return "standard deviation";
-    case StatisticType::peakDifference:
-      return "difference of the largest values";
-    case StatisticType::lowDifference:
-      return "difference of the smallest values";
-  }
-  return "";
-}
-
 std::string_view functionTypeName(FunctionType type) {
   switch (type) {
     case FunctionType::sum:
@@ -121,6 +104,23 @@ class Summary final {
 };
 
 }  // namespace
+
+std::string_view statisticName(const OutputMeasure& measure) {
+  if (measure.interfaceType == InterfaceType::measureFile) return "written by the model";
+  switch (measure.statisticType) {
+    case StatisticType::mean:
+      return "mean";
+    case StatisticType::rootMeanSquare:
+      return "root mean square";
+    case StatisticType::standardDeviation:
+      return "standard deviation";
+    case StatisticType::peakDifference:
+      return "difference of the largest values";
+    case StatisticType::lowDifference:
+      return "difference of the smallest values";
+  }
+  return "";
+}
 
 std::string taskName(const RunConfig& config) {
   switch (config.simulationOption) {

@@ -2,6 +2,7 @@
 
 #include <span>
 #include <string>
+#include <string_view>
 
 #include "parameters/search_space.h"
 #include "run/run_config.h"
@@ -10,6 +11,9 @@ namespace mirevo {
 
 /// The chosen task, "Parameter optimisation: Dynamically Dimensioned Search"; "none" for one that does not exist.
 std::string taskName(const RunConfig& config);
+
+/// How a measure comes about: "root mean square", "written by the model".
+std::string_view statisticName(const OutputMeasure& measure);
 
 /// What the run is about to do, for the log, several lines without a line end behind the last: task, parameters with
 /// their bounds on the model's and the search's scale, measures, objective functions, evaluations, slots.

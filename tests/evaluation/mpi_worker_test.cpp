@@ -89,6 +89,7 @@ TEST(RankMessages, ContentThatWasCutOrHasMoreIsRefused) {
   message.result.measureValues = {1.0, -0.0};
   message.result.failure = EvaluationFailure{EvaluationFailure::Kind::signal, "why", {"a", ""}};
   message.result.warnings = {"careful"};
+  message.result.shownSeries = {{{10, 20}, {1.0F, 2.0F}}, {}};
   message.leftBehind = "left";
   const std::string content = encode(message);
   EXPECT_EQ(encode(decodeResult(content)), content);

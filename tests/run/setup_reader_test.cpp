@@ -152,6 +152,7 @@ TEST_F(SetupReaderTest, EchoesEverySectionAndValueInReadingOrder) {
                                        "  Title = 'Upper catchment'\n"
                                        "  Restart = 0 (default)\n"
                                        "  FailedRunFolders = 3 (default)\n"
+                                       "  Report = 1 (default)\n"
                                        "[MIREVO_SIMULATION_OPTION/SIMBATCH]\n"
                                        "  TqSEKdxListItemCount = 1\n"
                                        "[MIREVO_SIMULATION_OPTION/SIMBATCH/SIMBATCHITEM_1]\n"

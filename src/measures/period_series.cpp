@@ -1,0 +1,77 @@
+#include "measures/period_series.h"
+
+#include <algorithm>
+#include <cmath>
+#include <limits>
+#include <optional>
+
+#include "common/calendar.h"
+#include "measures/measure_statistics.h"
+
+namespace mirevo {
+
+PeriodSeries readPeriodSeries(TimeSeriesObject& series, const SeriesReference& reference,
+                              const EvaluationPeriod& period) {
+  requireItem(series, reference);
+  PeriodSeries read;
+  const std::optional<DateRecord> start = series.startTime();
+  if (!start) return read;
+  constexpr double kSecondsPerDay = 86400.0;
+  const std::int64_t origin = secondNumber(*start);
+  const std::span<const double> times = series.times();
+  const std::span<const float> values = series.values(reference.itemNo);
+  const auto dayOf = [origin](const DateRecord& date) {
+    return static_cast<double>(secondNumber(date) - origin) / kSecondsPerDay;
+  };
+  auto first = std::upper_bound(times.begin(), times.end(), dayOf(period.start));
+  if (first != times.begin()) --first;
+  auto last = std::lower_bound(first, times.end(), dayOf(period.end));
+  if (last != times.end()) ++last;
+  const std::optional<float> deleteValue = series.deleteValue();
+  for (auto time = first; time != last; ++time) {
+    const std::int64_t second = origin + std::llround(*time * kSecondsPerDay);
+    if (!read.seconds.empty() && second <= read.seconds.back()) continue;  // steps of less than a second
+    const float value = values[static_cast<std::size_t>(time - times.begin())];
+    read.seconds.push_back(second);
+    read.values.push_back(isMissing(value, deleteValue) ? std::numeric_limits<float>::quiet_NaN() : value);
+  }
+  return read;
+}
+
+std::vector<float> valuesAt(const PeriodSeries& series, std::span<const std::int64_t> seconds) {
+  std::vector<float> values(seconds.size(), std::numeric_limits<float>::quiet_NaN());
+  std::size_t next = 0;  // first step that is not before the time
+  for (std::size_t i = 0; i < seconds.size(); ++i) {
+    while (next < series.seconds.size() && series.seconds[next] < seconds[i]) ++next;
+    if (next == series.seconds.size()) break;
+    if (series.seconds[next] == seconds[i]) {
+      values[i] = series.values[next];
+    } else if (next > 0) {
+      const auto before = static_cast<double>(seconds[i] - series.seconds[next - 1]);
+      const auto width = static_cast<double>(series.seconds[next] - series.seconds[next - 1]);
+      const double below = series.values[next - 1];
+      values[i] = static_cast<float>(below + (series.values[next] - below) * before / width);
+    }
+  }
+  return values;
+}
+
+bool isSamePair(const OutputMeasure& a, const OutputMeasure& b) {
+  const auto isSame = [](const SeriesReference& left, const SeriesReference& right) {
+    return left.fileName == right.fileName && left.itemNo == right.itemNo;
+  };
+  return isSame(a.simulation, b.simulation) && isSame(a.observation, b.observation);
+}
+
+std::vector<std::size_t> measuresOfDistinctPairs(std::span<const OutputMeasure> measures) {
+  std::vector<std::size_t> distinct;
+  for (std::size_t i = 0; i < measures.size(); ++i) {
+    if (measures[i].interfaceType != InterfaceType::timeSeries) continue;
+    const bool isRepeated = std::any_of(distinct.begin(), distinct.end(),
+                                        [&](std::size_t other) { return isSamePair(measures[i], measures[other]); });
+    if (!isRepeated) distinct.push_back(i);
+  }
+  return distinct;
+}
+
+}  // namespace mirevo

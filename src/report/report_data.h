@@ -1,0 +1,122 @@
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <limits>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "report/covariance_lines.h"
+#include "report/failure_reasons.h"
+#include "report/series_table.h"
+
+namespace mirevo {
+
+/// What a report shows. Numbers that are unknown are NaN; texts may hold anything.
+
+enum class RunStateShown { finished, running, cutOff, cancelled, failed };
+
+struct ReportedRun {
+  std::string title;
+  std::string setupFile;  ///< without its folder
+  std::string setupName;
+  std::string task;      ///< "scenarios", "sensitivity", "optimisation" or "uncertainty"
+  std::string taskName;  ///< for a person
+  std::string started;
+  std::string ended;  ///< empty while it runs
+  std::string reportMade;
+  RunStateShown state = RunStateShown::finished;
+  std::string message;  ///< why it stopped; may be empty
+  int planned = 0;      ///< evaluations; 0: unknown
+  std::string aggregation;
+  std::string algorithm;   ///< "SCE", "PSE" or "DDS"; empty where there is none
+  std::string surrogate;   ///< empty: none
+  int populationSize = 0;  ///< 0: none
+  std::string periodStart;
+  std::string periodEnd;
+  std::optional<int> seed;
+  std::vector<std::string> notes;  ///< whole sentences on what is missing or old
+};
+
+struct ReportedParameter {
+  std::string name;
+  std::string comment;
+  std::string equation;
+  std::string kind;            ///< "variable", "fixed" or "dependent"
+  std::string transformation;  ///< "none" or "logarithmic"
+  bool isInteger = false;
+  double lower = 0.0;
+  double upper = 0.0;
+  double start = 0.0;
+  double best = std::numeric_limits<double>::quiet_NaN();
+  std::string nearBound;  ///< "lower", "upper" or empty
+};
+
+struct ReportedMeasure {
+  std::string name;
+  std::string statistic;
+  double weight = 1.0;
+  std::string objective;  ///< empty: none
+  double initial = std::numeric_limits<double>::quiet_NaN();
+  double best = std::numeric_limits<double>::quiet_NaN();
+};
+
+struct ReportedObjective {
+  std::string name;
+  double initial = std::numeric_limits<double>::quiet_NaN();
+  double best = std::numeric_limits<double>::quiet_NaN();
+};
+
+/// The evaluations in the order of their numbers, column by column; failed ones hold NaN.
+struct ReportedEvaluations {
+  std::vector<int> numbers;
+  std::vector<bool> ok;
+  std::vector<double> aggregate;
+  std::vector<std::vector<double>> parameters;  ///< one column a variable parameter, model scale
+  std::vector<std::vector<double>> measures;
+  std::vector<std::vector<double>> objectives;
+};
+
+/// The 5 to 95 % band of an uncertainty analysis, one entry an observation.
+struct ReportedBand {
+  std::string measure;
+  std::vector<std::int64_t> seconds;
+  std::vector<float> observed;
+  std::vector<float> lower;
+  std::vector<float> median;
+  std::vector<float> upper;
+  std::size_t observationCount = 0;  ///< observations with a simulated value
+  std::size_t insideCount = 0;       ///< those of them in the band
+};
+
+struct ReportedSensitivity {
+  std::vector<std::string> parameters;
+  std::vector<std::string> outputs;  ///< output measures, then objective functions
+  std::vector<std::vector<double>> derivatives;
+  std::vector<std::vector<double>> dimensionless;
+  std::vector<double> composite;
+  std::vector<std::string> ranking;
+  std::optional<CovarianceReport> covariance;
+};
+
+struct ReportData {
+  std::string program;
+  ReportedRun run;
+  std::vector<ReportedParameter> parameters;
+  std::vector<ReportedMeasure> measures;
+  std::vector<ReportedObjective> objectives;
+  std::optional<ShownEvaluation> best;
+  std::optional<int> initialNumber;    ///< the evaluation that start values of measures are of
+  bool isOfInitialParameters = false;  ///< it has the setup's values; else it is the first that succeeded
+  std::vector<FailureReason> failures;
+  ReportedEvaluations evaluations;
+  std::int64_t periodFirst = 0;  ///< secondNumber() of the evaluation period's ends
+  std::int64_t periodLast = 0;
+  SeriesTable series;
+  std::vector<ReportedBand> bands;
+  std::optional<ReportedSensitivity> sensitivity;
+  std::vector<std::string> summary;  ///< the closing lines of the result file
+};
+
+}  // namespace mirevo

@@ -1,0 +1,254 @@
+#include "report/report_json.h"
+
+#include <algorithm>
+#include <cmath>
+
+#include <fmt/format.h>
+
+#include "common/calendar.h"
+#include "report/fit_figures.h"
+#include "report/json_writer.h"
+#include "report/thinning.h"
+
+namespace mirevo {
+namespace {
+
+using Digits = JsonWriter::Digits;
+
+constexpr int kFormat = 1;
+constexpr std::int64_t kMilliseconds = 1000;
+
+std::string_view stateName(RunStateShown state) {
+  switch (state) {
+    case RunStateShown::finished:
+      return "finished";
+    case RunStateShown::running:
+      return "running";
+    case RunStateShown::cutOff:
+      return "cut off";
+    case RunStateShown::cancelled:
+      return "cancelled";
+    case RunStateShown::failed:
+      return "failed";
+  }
+  return {};
+}
+
+/// Milliseconds since 1970.
+std::int64_t epochMilliseconds(std::int64_t second) {
+  constexpr std::int64_t kEpoch = dayNumber(1970, 1, 1) * 86400;
+  return (second - kEpoch) * kMilliseconds;
+}
+
+std::string isoTime(std::int64_t second) {
+  using namespace date_field;
+  const DateRecord date = dateOfSecond(second);
+  return fmt::format("{:04}-{:02}-{:02}T{:02}:{:02}:{:02}", date[kYear], date[kMonth], date[kDay], date[kHour],
+                     date[kMinute], date[kSecond]);
+}
+
+/// The times as start and step where they are equidistant, else one by one.
+void writeTimes(JsonWriter& json, const std::vector<std::int64_t>& seconds) {
+  json.member("count", seconds.size());
+  if (seconds.empty()) return;
+  json.member("start", isoTime(seconds.front()));
+  const std::int64_t step = seconds.size() > 1 ? seconds[1] - seconds[0] : 0;
+  const bool isRegular =
+      step > 0 && std::adjacent_find(seconds.begin(), seconds.end(),
+                                     [step](std::int64_t a, std::int64_t b) { return b - a != step; }) == seconds.end();
+  if (isRegular) {
+    json.member("step", step * kMilliseconds);
+    return;
+  }
+  json.key("times").beginArray();
+  for (const std::int64_t second : seconds) json.integer(epochMilliseconds(second));
+  json.endArray();
+}
+
+void writeRun(JsonWriter& json, const ReportData& data) {
+  const ReportedRun& run = data.run;
+  json.key("run").beginObject();
+  json.member("title", run.title).member("setup", run.setupFile).member("setupName", run.setupName);
+  json.member("task", run.task).member("taskName", run.taskName);
+  json.optionalMember("started", run.started).optionalMember("ended", run.ended).member("reportMade", run.reportMade);
+  json.member("state", stateName(run.state)).optionalMember("message", run.message);
+  json.member("evaluations", data.evaluations.numbers.size());
+  json.key("planned");
+  if (run.planned > 0) {
+    json.integer(run.planned);
+  } else {
+    json.null();
+  }
+  json.member("failed", std::count(data.evaluations.ok.begin(), data.evaluations.ok.end(), false));
+  json.member("aggregation", run.aggregation).optionalMember("algorithm", run.algorithm);
+  json.optionalMember("surrogate", run.surrogate).key("populationSize");
+  if (run.populationSize > 0) {
+    json.integer(run.populationSize);
+  } else {
+    json.null();
+  }
+  json.key("period").beginArray().text(run.periodStart).text(run.periodEnd).endArray();
+  json.key("seed");
+  if (run.seed) {
+    json.integer(*run.seed);
+  } else {
+    json.null();
+  }
+  json.member("notes", run.notes).endObject();
+}
+
+void writeParameters(JsonWriter& json, const ReportData& data) {
+  json.key("parameters").beginArray();
+  for (const ReportedParameter& parameter : data.parameters) {
+    json.beginObject().member("name", parameter.name).member("kind", parameter.kind);
+    json.optionalMember("comment", parameter.comment).optionalMember("equation", parameter.equation);
+    json.member("transformation", parameter.transformation).member("integer", parameter.isInteger);
+    json.member("lower", parameter.lower).member("upper", parameter.upper);
+    json.member("start", parameter.start).member("best", parameter.best);
+    json.optionalMember("nearBound", parameter.nearBound).endObject();
+  }
+  json.endArray();
+}
+
+void writeMeasures(JsonWriter& json, const ReportData& data) {
+  json.key("measures").beginArray();
+  for (const ReportedMeasure& measure : data.measures) {
+    json.beginObject().member("name", measure.name).member("statistic", measure.statistic);
+    json.member("weight", measure.weight).optionalMember("objective", measure.objective);
+    json.member("initial", measure.initial).member("best", measure.best).endObject();
+  }
+  json.endArray().key("objectives").beginArray();
+  for (const ReportedObjective& objective : data.objectives) {
+    json.beginObject().member("name", objective.name);
+    json.member("initial", objective.initial).member("best", objective.best).endObject();
+  }
+  json.endArray().key("best");
+  if (data.best) {
+    json.beginObject().member("number", data.best->number).member("aggregate", data.best->aggregate).endObject();
+  } else {
+    json.null();
+  }
+}
+
+void writeFailures(JsonWriter& json, const ReportData& data) {
+  json.key("failures").beginArray();
+  for (const FailureReason& failure : data.failures) {
+    json.beginObject().member("reason", failure.reason).member("count", failure.count);
+    json.member("example", failure.example).endObject();
+  }
+  json.endArray();
+}
+
+void writeEvaluations(JsonWriter& json, const ReportedEvaluations& evaluations) {
+  json.key("evaluations").beginObject().member("count", evaluations.numbers.size());
+  json.key("numbers").beginArray();
+  for (const int number : evaluations.numbers) json.integer(number);
+  json.endArray().key("ok").beginArray();
+  for (const bool ok : evaluations.ok) json.integer(ok ? 1 : 0);
+  json.endArray();
+  json.key("aggregate").numbers(evaluations.aggregate, Digits::drawn);
+  json.key("parameters").rows(evaluations.parameters, Digits::drawn);
+  json.key("objectives").rows(evaluations.objectives, Digits::drawn);
+  json.key("measures").rows(evaluations.measures, Digits::drawn).endObject();
+}
+
+void writeFigures(JsonWriter& json, std::string_view name, const FitFigures& figures) {
+  if (figures.count == 0) return;
+  json.key(name).beginObject().member("n", figures.count).member("nse", figures.nse).member("kge", figures.kge);
+  json.member("kgeR", figures.correlation).member("kgeAlpha", figures.variability);
+  json.member("kgeBeta", figures.meanRatio).member("pbias", figures.percentBias);
+  json.member("rmse", figures.rmse).member("r2", figures.rSquared).endObject();
+}
+
+void writeFlowDuration(JsonWriter& json, const ShownSeries& series) {
+  json.key("flowDuration").beginObject();
+  json.key("exceedance").numbers(exceedancePercentages(), Digits::drawn);
+  json.key("observed").numbers(flowDuration(series.observed), Digits::drawn);
+  json.key("initial").numbers(flowDuration(series.initial), Digits::drawn);
+  json.key("best").numbers(flowDuration(series.best), Digits::drawn).endObject();
+}
+
+void writeSeries(JsonWriter& json, const ReportData& data) {
+  json.key("series").beginArray();
+  for (const ShownSeries& series : data.series.series) {
+    json.beginObject().member("measure", series.measure).key("unit").null();
+    const bool isThinned = series.seconds.size() > kMostDrawnTimes;
+    const ShownSeries& drawn = isThinned ? thinned(series) : series;
+    writeTimes(json, drawn.seconds);
+    json.key("observed").numbers(drawn.observed, Digits::drawn);
+    if (data.series.initial) json.key("initial").numbers(drawn.initial, Digits::drawn);
+    if (data.series.best) {
+      json.key("best").numbers(drawn.best, Digits::drawn).member("bestNumber", data.series.best->number);
+    }
+    json.key("period").beginArray().integer(epochMilliseconds(data.periodFirst));
+    json.integer(epochMilliseconds(data.periodLast)).endArray();
+    json.key("figures").beginObject();
+    if (data.series.initial) writeFigures(json, "initial", fitFigures(series.initial, series.observed));
+    if (data.series.best) writeFigures(json, "best", fitFigures(series.best, series.observed));
+    json.endObject().member("thinned", isThinned);
+    if (isThinned) writeFlowDuration(json, series);
+    json.endObject();
+  }
+  json.endArray();
+}
+
+void writeBands(JsonWriter& json, const ReportData& data) {
+  json.key("band").beginArray();
+  for (const ReportedBand& band : data.bands) {
+    json.beginObject().member("measure", band.measure);
+    writeTimes(json, band.seconds);
+    json.key("observed").numbers(band.observed, Digits::drawn).key("p5").numbers(band.lower, Digits::drawn);
+    json.key("p50").numbers(band.median, Digits::drawn).key("p95").numbers(band.upper, Digits::drawn);
+    json.member("inside", static_cast<double>(band.insideCount) / static_cast<double>(band.observationCount));
+    json.member("n", band.observationCount).endObject();
+  }
+  json.endArray();
+}
+
+void writeSensitivity(JsonWriter& json, const ReportedSensitivity& sensitivity) {
+  json.key("sensitivity").beginObject().member("parameters", sensitivity.parameters);
+  json.member("outputs", sensitivity.outputs);
+  json.key("derivatives").rows(sensitivity.derivatives, Digits::drawn);
+  json.key("dimensionless").rows(sensitivity.dimensionless, Digits::drawn);
+  json.key("composite").numbers(sensitivity.composite, Digits::drawn).member("ranking", sensitivity.ranking);
+  json.key("covariance");
+  if (sensitivity.covariance) {
+    const CovarianceReport& covariance = *sensitivity.covariance;
+    json.beginObject().member("names", covariance.names);
+    json.key("estimate").numbers(covariance.estimate, Digits::table);
+    json.key("standardDeviation").numbers(covariance.standardDeviation, Digits::table);
+    json.key("lower95").numbers(covariance.lower95, Digits::table);
+    json.key("upper95").numbers(covariance.upper95, Digits::table);
+    json.key("correlation").rows(covariance.correlation, Digits::drawn);
+    json.member("leftOut", covariance.leftOut).endObject();
+  } else {
+    json.null();
+  }
+  json.endObject();
+}
+
+}  // namespace
+
+std::string reportJson(const ReportData& data) {
+  JsonWriter json;
+  json.beginObject().member("format", kFormat).member("program", data.program);
+  writeRun(json, data);
+  writeParameters(json, data);
+  writeMeasures(json, data);
+  json.key("initialNumber");
+  if (data.initialNumber) {
+    json.integer(*data.initialNumber);
+    json.member("initialLabel", data.isOfInitialParameters ? "initial parameters" : "first evaluation");
+  } else {
+    json.null();
+  }
+  writeFailures(json, data);
+  writeEvaluations(json, data.evaluations);
+  writeSeries(json, data);
+  writeBands(json, data);
+  if (data.sensitivity) writeSensitivity(json, *data.sensitivity);
+  json.member("summary", data.summary).endObject();
+  return json.take();
+}
+
+}  // namespace mirevo

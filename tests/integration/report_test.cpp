@@ -1,0 +1,164 @@
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "integration/model_folder.h"
+
+namespace mirevo::testing {
+namespace {
+
+using ::testing::AllOf;
+using ::testing::EndsWith;
+using ::testing::HasSubstr;
+using ::testing::Not;
+using ::testing::StartsWith;
+
+/// The data in a report's page.
+std::string reportData(const ModelFolder& folder) {
+  const std::string page = folder.read("basin_Report.html");
+  const std::string mark = "id=\"report-data\">";
+  const auto start = page.find(mark);
+  if (start == std::string::npos) return page;
+  return page.substr(start + mark.size(), page.find("</script>", start) - start - mark.size());
+}
+
+ProgramResult makeReport(const ModelFolder& folder, const std::string& setup = "basin.kdx") {
+  return RunningProgram({folder / setup}, {}, MIREVO_REPORT).wait();
+}
+
+TEST(Report, StandsBesideTheResultsHoweverARunEnds) {
+  const struct {
+    RunSettings settings;
+    int exitCode;
+    std::vector<const char*> parts;
+  } cases[] = {
+      {{.maxEvaluations = 30},
+       0,
+       {R"("state":"finished","message":"Optimisation terminated: Maximum number of)",
+        R"("evaluations":31,"planned":31)", R"({"name":"b","kind":"variable")", R"("start":1,"best":)",
+        R"("series":[{"measure":"flow")", R"("step":86400000)", R"("figures":{"initial":{"n":365,"nse":)",
+        R"("initialNumber":1,"initialLabel":"initial parameters")"}},
+      {{.option = 0, .scenarios = {"5, 2, 1", "1, 2, 1"}, .modelArguments = "--fail-above 4.5"},
+       1,
+       {R"("state":"failed","message":"Error: Unable to continue. No of failed)", R"("failed":1)",
+        R"("failures":[{"reason":"run.sh exited with code 3","count":1,"example":"Evaluation 1: run.sh)",
+        R"("series":[])"}},
+      {{.option = 1},
+       0,
+       {R"("task":"sensitivity")", R"("derivatives":[[)", R"("covariance":{"names":["a","b"],"estimate":[4,1])"}},
+      {{.option = 3, .maxEvaluations = 20},
+       0,
+       {R"("band":[{"measure":"flow","count":365,"start":"2001-01-01T00:00:00","step":86400000,"observed":[5,)",
+        R"("initialLabel":"first evaluation")"}},
+  };
+  for (const auto& c : cases) {
+    const ModelFolder folder;
+    EXPECT_EQ(runProgram({folder.writeSetup(c.settings)}).exitCode, c.exitCode);
+    const std::string data = reportData(folder);
+    for (const char* part : c.parts) EXPECT_THAT(data, HasSubstr(part));
+    EXPECT_FALSE(folder.exists("basin_Report.html.tmp"));
+    // From the files alone the same comes out, but for the times.
+    EXPECT_EQ(makeReport(folder).exitCode, 0);
+    const std::string again = reportData(folder);
+    EXPECT_EQ(again.substr(again.find("\"parameters\":")), data.substr(data.find("\"parameters\":")));
+    const auto stateOf = [](const std::string& text) { return text.substr(text.find("\"state\""), 20); };
+    EXPECT_EQ(stateOf(again), stateOf(data));
+  }
+}
+
+TEST(Report, SeriesAreThoseOfTheInitialAndTheBestEvaluationWhateverTheSlots) {
+  std::string ofOneSlot;
+  for (const int slots : {1, 3}) {
+    const ModelFolder folder;
+    ASSERT_EQ(runProgram({folder.writeSetup({.option = 3, .maxEvaluations = 40, .slots = slots})}).exitCode, 0);
+    const std::string series = folder.read("basin_Series.dat");
+    EXPECT_THAT(series, StartsWith("# Small test basin\n# Mirevo "));
+    const std::string rows = series.substr(series.find("# Initial: evaluation 1, the first that succeeded"));
+    if (slots == 1) ofOneSlot = rows;
+    EXPECT_EQ(rows, ofOneSlot);
+    // At t = 0 the model gives a, which the result file has, too.
+    const std::string results = folder.read("basin.dat");
+    const auto valueOf = [&results](int number) {
+      const auto row = results.find(fmt::format("\n{}\tOK\t", number)) + fmt::format("\n{}\tOK\t", number).size();
+      return std::strtod(results.c_str() + row, nullptr);
+    };
+    int best = 0;
+    ASSERT_EQ(std::sscanf(rows.substr(rows.find("# Best: ")).c_str(), "# Best: evaluation %d,", &best), 1);
+    EXPECT_THAT(results, HasSubstr(fmt::format("# Best evaluation: {}\n", best)));
+    double initialValue = 0.0;
+    double bestValue = 0.0;
+    ASSERT_EQ(std::sscanf(rows.substr(rows.find("\nflow\t")).c_str(), "\nflow\t2001-01-01T00:00:00\t5\t%lf\t%lf",
+                          &initialValue, &bestValue),
+              2);
+    EXPECT_NEAR(initialValue, valueOf(1), 1e-5);
+    EXPECT_NEAR(bestValue, valueOf(best), 1e-5);
+  }
+}
+
+TEST(Report, OfARunThatGoesOnOrWasCutOffSaysSoAndLeavesItsFilesAlone) {
+  const ModelFolder folder;
+  folder.write("model/run.sh", fmt::format("#!/bin/sh\n"
+                                           "test -e first || {{ touch first; exec {0}; }}\n"
+                                           "exec {0} --sleep-ms 3600000\n",
+                                           MIREVO_TEST_MODEL));
+  folder.writeSetup({.option = 0, .scenarios = {"1, 1, 1", "2, 2, 1"}});
+  EXPECT_THAT(makeReport(folder).error, HasSubstr("basin.dat: No such file or directory"));
+  {
+    RunningProgram run({folder / "basin.kdx"});
+    ASSERT_TRUE(waitUntil([&] { return folder.read("basin.dat").find("\n1\tOK\t") != std::string::npos; }));
+    const std::string log = folder.read("basin.log");
+    const ProgramResult report = makeReport(folder);
+    EXPECT_EQ(report.exitCode, 0) << report.error;
+    EXPECT_EQ(report.output, folder / "basin_Report.html\n");
+    EXPECT_THAT(reportData(folder),
+                AllOf(HasSubstr(R"("ended":null)"), HasSubstr(R"("state":"running","message":null)"),
+                      HasSubstr(R"("evaluations":1,"planned":2)")));
+    EXPECT_THAT(folder.read("basin.log"), StartsWith(log));
+    EXPECT_FALSE(folder.exists("basin.1.log"));
+  }  // killed
+  folder.write("basin.dat", folder.read("basin.dat") + "2\tOK\t0.");
+  EXPECT_EQ(makeReport(folder).exitCode, 0);
+  EXPECT_THAT(reportData(folder),
+              AllOf(HasSubstr(R"("state":"cut off")"), HasSubstr("1 line of the result file is cut off"),
+                    HasSubstr(R"("evaluations":1,)")));
+}
+
+TEST(Report, IsLeftOutWhereTheSetupSaysSoAndNeverFailsTheRun) {
+  const ModelFolder folder;
+  folder.writeSetup({.option = 0});
+  std::string setup = folder.read("basin.kdx");
+  setup.insert(setup.find("    Title = "), "    Report = 0\n");
+  folder.write("silent.kdx", setup);
+  EXPECT_EQ(runProgram({folder / "silent.kdx"}).exitCode, 0);
+  EXPECT_FALSE(folder.exists("silent_Report.html"));
+  EXPECT_TRUE(folder.exists("silent_Series.dat"));
+  EXPECT_EQ(makeReport(folder, "silent.kdx").exitCode, 0);
+  EXPECT_TRUE(folder.exists("silent_Report.html"));
+
+  std::filesystem::create_directories(folder / "basin_Report.html/in the way");
+  EXPECT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0);
+  EXPECT_THAT(folder.read("basin.log"), AllOf(HasSubstr("Warning: The report cannot be written: Is a directory"),
+                                              EndsWith("Normal termination\n")));
+}
+
+TEST(Report, HoldsWhateverNamesTheSetupHas) {
+  const ModelFolder folder;
+  folder.writeSetup({.option = 0});
+  std::string setup = folder.read("basin.kdx");
+  const auto replace = [&setup](const std::string& from, const std::string& to) {
+    for (auto at = setup.find(from); at != std::string::npos; at = setup.find(from, at + to.size()))
+      setup.replace(at, from.size(), to);
+  };
+  replace("'Small test basin'", "'</script><script>alert(1)</script> \xFC @REPORT_DATA@'");
+  replace("Name = 'flow'", "Name = '<b>\"#" + std::string(200, 'x') + "'");
+  replace("'fit'", "'f </script>'");
+  folder.write("basin.kdx", setup);
+  EXPECT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0) << folder.read("basin.log");
+  const std::string page = folder.read("basin_Report.html");
+  EXPECT_THAT(page,
+              AllOf(Not(HasSubstr("alert(1)</script>")), HasSubstr("<title>&lt;/script&gt;&lt;script&gt;alert(1)")));
+  EXPECT_THAT(reportData(folder), AllOf(HasSubstr(R"("series":[{"measure":"\u003cb\u003e\"#xxx)"), EndsWith("]}"),
+                                        HasSubstr(R"("notes":[])")));
+}
+
+}  // namespace
+}  // namespace mirevo::testing

@@ -1,0 +1,101 @@
+#include <cmath>
+#include <limits>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "common/calendar.h"
+#include "report/json_writer.h"
+#include "report/report_file.h"
+#include "report/report_json.h"
+#include "report/thinning.h"
+
+namespace mirevo {
+namespace {
+
+using ::testing::HasSubstr;
+using ::testing::Not;
+
+TEST(JsonWriter, TextsCannotLeaveTheirScriptElementAndAreUtf8) {
+  const struct {
+    std::string_view text;
+    const char* json;
+  } cases[] = {
+      {"</script><!--&", R"("\u003c/script\u003e\u003c!--\u0026")"},
+      {"\"\\\n\t\x01", R"("\"\\\u000a\u0009\u0001")"},
+      {"Müßig 流 \xF0\x9F\x8C\x8A", "\"Müßig 流 \xF0\x9F\x8C\x8A\""},
+      {"a\xE2\x80\xA8"
+       "b\xE2\x80\xA9",
+       R"("a\u2028b\u2029")"},
+      {"\xFC", "\"\uFFFD\""},                                // Latin-1
+      {"\xC0\x80", "\"\uFFFD\uFFFD\""},                      // overlong
+      {"\xED\xA0\x80", "\"\uFFFD\uFFFD\uFFFD\""},            // surrogate
+      {"\xF4\x90\x80\x80", "\"\uFFFD\uFFFD\uFFFD\uFFFD\""},  // past the last character
+      {"x\xE2\x82", "\"x\uFFFD\uFFFD\""},                    // cut off
+      {std::string_view("a\0b", 3), R"("a\u0000b")"},
+  };
+  for (const auto& c : cases) EXPECT_EQ(JsonWriter().text(c.text).take(), c.json);
+}
+
+TEST(JsonWriter, NumbersThatAreNoneAreNullAndCommasComeBetweenValues) {
+  const double infinity = std::numeric_limits<double>::infinity();
+  JsonWriter json;
+  json.beginObject().member("a", 0.1).member("b", true).member("c", 3).key("d");
+  json.numbers(std::vector{std::nan(""), infinity, -infinity, 1.0 / 3.0, 1e300}, JsonWriter::Digits::drawn);
+  json.key("e").rows(std::vector<std::vector<float>>{{}, {1.5F}, {2.0F, 3.0F}}, JsonWriter::Digits::drawn);
+  json.optionalMember("f", "").endObject();
+  EXPECT_EQ(json.take(),
+            R"({"a":0.1,"b":true,"c":3,"d":[null,null,null,0.3333333,1e+300],"e":[[],[1.5],[2,3]],"f":null})");
+}
+
+ShownSeries daily(std::size_t count) {
+  ShownSeries series;
+  series.measure = "flow";
+  const std::int64_t start = secondNumber({1970, 1, 1});
+  for (std::size_t i = 0; i < count; ++i) {
+    series.seconds.push_back(start + 86400 * static_cast<std::int64_t>(i));
+    series.observed.push_back(static_cast<float>(i % 100));
+    series.initial.push_back(std::nanf(""));
+    series.best.push_back(i == count / 2 + 1 ? 1000.0F : 5.0F);
+  }
+  return series;
+}
+
+TEST(ReportPage, FillsBothPlacesOnceWhateverTheTitleHolds) {
+  ReportData data;
+  data.run.title = "</title>@REPORT_DATA@ & \n\"x\"";
+  const std::string page = reportPage("<title>@REPORT_TITLE@</title>|@REPORT_DATA@|end", data);
+  EXPECT_THAT(page, ::testing::StartsWith("<title>&lt;/title&gt;@REPORT_DATA@ &amp;  \"x\"</title>|{\"format\":1,"));
+  EXPECT_THAT(page, ::testing::EndsWith("}|end"));
+  EXPECT_THAT(page, HasSubstr(R"("title":"\u003c/title\u003e@REPORT_DATA@ \u0026 \u000a\"x\"")"));
+}
+
+TEST(ReportPage, TimesAreAStepWhereTheyAreRegularAndALongSeriesIsThinnedForDrawingAlone) {
+  ReportData data;
+  data.series.best = ShownEvaluation{3, 0.5};
+  data.series.series = {daily(3), daily(kMostDrawnTimes + 1)};
+  std::string json = reportJson(data);
+  EXPECT_THAT(json, HasSubstr(R"("count":3,"start":"1970-01-01T00:00:00","step":86400000,"observed":[0,1,2],)"
+                              R"("best":[5,5,1000],"bestNumber":3)"));
+  EXPECT_THAT(json, HasSubstr(R"("n":100001,)"));  // the figures are of all values
+  EXPECT_THAT(json, HasSubstr(R"("thinned":true,"flowDuration":{"exceedance":[0.05,)"));
+
+  data.series.series = {daily(3)};
+  data.series.series[0].seconds[2] += 1;
+  json = reportJson(data);
+  EXPECT_THAT(json, HasSubstr(R"("times":[0,86400000,172801000])"));
+  EXPECT_THAT(json, Not(HasSubstr("\"step\"")));
+
+  const ShownSeries whole = daily(kMostDrawnTimes + 1);
+  const ShownSeries drawn = thinned(whole);
+  EXPECT_LE(drawn.seconds.size(), kMostDrawnTimes);
+  EXPECT_TRUE(std::is_sorted(drawn.seconds.begin(), drawn.seconds.end()));
+  EXPECT_EQ(*std::max_element(drawn.best.begin(), drawn.best.end()), 1000.0F);  // its only peak
+  const std::vector<double> curve = flowDuration(whole.observed);
+  EXPECT_EQ(curve.front(), 99.0);
+  EXPECT_EQ(curve[curve.size() / 2], 49.0);
+  EXPECT_EQ(curve.back(), 0.0);
+}
+
+}  // namespace
+}  // namespace mirevo
