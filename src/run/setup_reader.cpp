@@ -320,12 +320,21 @@ void SetupReader::readSensitivityAnalysis() {
   validateLocalSensitivity(config_.sensitivity, config_.parameters, local);
 }
 
+/// Too small a population or simplex spans too few directions and ends early, away from the optimum.
+void warnAboutFewPoints(const SetupSection& section, std::string_view keyword, std::int64_t found,
+                        std::int64_t advised) {
+  if (found >= advised) return;
+  section.warn(keyword,
+               fmt::format("found {}, at least {} are advised for the number of variable parameters", found, advised));
+}
+
 void SetupReader::readOptimisation() {
   OptimisationConfig& search = config_.optimisation;
   const SetupSection section = target_.open("OPTIMISATION_ALGORITHM");
   section.read(config_);
   validateAlgorithmType(search.algorithmType, section);
   const bool isDds = search.algorithmType == AlgorithmType::dds;
+  const auto variableCount = static_cast<std::int64_t>(config_.variableParameterCount());
   if (search.useSurrogateModel != 0 && search.useSurrogateModel != 1) {
     section.warn("Use_Surrogate_Model", "neither 0 nor 1, no search will be run");
   }
@@ -336,12 +345,16 @@ void SetupReader::readOptimisation() {
       const SetupSection control = section.open("SCE_CONTROL_PARAMETERS");
       control.read(config_);
       validateSceControl(search.sce, search.simplex, control);
+      warnAboutFewPoints(control, "No_Points_Complex", search.sce.pointsPerComplex, 2 * variableCount + 1);
+      warnAboutFewPoints(control, "No_Points_Subcomplex", search.simplex.pointCount, variableCount + 1);
       break;
     }
     case AlgorithmType::pse: {
       const SetupSection control = section.open("PSE_CONTROL_PARAMETERS");
       control.read(config_);
       validatePseControl(search.pse, search.simplex, control);
+      warnAboutFewPoints(control, "Population_Size", search.pse.populationSize, 4 * (2 * variableCount + 1));
+      warnAboutFewPoints(control, "No_Points_Simplex", search.simplex.pointCount, variableCount + 1);
       break;
     }
     case AlgorithmType::dds: {
@@ -361,6 +374,13 @@ void SetupReader::readOptimisation() {
   stopping.read(config_);
   if (isDds) validateDdsBudget(search.stopping, stopping);
   validateStoppingCriteria(search.stopping, stopping);
+  const std::int64_t sampleSize = search.algorithmType == AlgorithmType::sce
+                                      ? std::int64_t{search.sce.complexCount} * search.sce.pointsPerComplex
+                                      : search.pse.populationSize;
+  if (!isDds && sampleSize > search.stopping.maxEvaluations) {
+    stopping.warn("Max_No_Evaluations", fmt::format("the initial sample of {} sets is cut to {}, and no search follows",
+                                                    sampleSize, search.stopping.maxEvaluations));
+  }
 
   if (search.useSurrogateModel != 1) return;
   const SetupSection surrogate = section.open("SURROGATE_MODEL_PARAMETERS");
