@@ -60,11 +60,10 @@ std::string ProgressReporter::progressInit(std::string_view runFileName, std::st
   } else if (destination == "STDOUT") {
     messageUnit_ = kStandardOutput;
   } else {
-    const std::string messageFile = baseName_ + std::string(kMessageFileEnding);
-    messageUnit_ = ::open(messageFile.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0666);
+    messageUnit_ = ::open(messageFile().c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0666);
     if (messageUnit_ < 0) {
       if (!problems.empty()) problems += '\n';
-      problems += fmt::format("Unable to open TqQmon2 message file: {}: {}", messageFile, std::strerror(errno));
+      problems += fmt::format("Unable to open TqQmon2 message file: {}: {}", messageFile(), std::strerror(errno));
     }
   }
   return problems;
@@ -85,9 +84,19 @@ void ProgressReporter::writeRecord(std::string_view kind, std::string_view text)
   record += '\n';
   const int descriptor = messageUnit_ == kStandardOutput ? STDOUT_FILENO : messageUnit_;
   if (writeWhole(descriptor, record)) return;
-  // A full disk or a closed pipe ends the reporting and not the run.
+  giveUp();
+}
+
+/// A full disk or a closed pipe, told by errno, ends the reporting and not the run.
+void ProgressReporter::giveUp() {
+  const std::string name = messageUnit_ == kStandardOutput ? "standard output" : messageFile();
+  problem_ = fmt::format("Progress is no longer reported: unable to write to {}: {}", name, std::strerror(errno));
   if (messageUnit_ > kStandardOutput) ::close(messageUnit_);
   messageUnit_ = kNowhere;
+}
+
+std::string ProgressReporter::messageFile() const {
+  return baseName_ + std::string(kMessageFileEnding);
 }
 
 void ProgressReporter::writeStatus(std::string_view text) {
@@ -157,7 +166,10 @@ void ProgressReporter::progressBest(int number, double aggregate, std::string_vi
 void ProgressReporter::progressEnd(std::string_view ending) {
   writeStatus(fmt::format("Ended: {}", ending));
   writeProgress("100.0");
-  if (messageUnit_ > kStandardOutput) ::close(messageUnit_);
+  if (messageUnit_ > kStandardOutput && ::close(messageUnit_) != 0) {
+    messageUnit_ = kNowhere;
+    problem_ = fmt::format("The end of the run may not be in {}: {}", messageFile(), std::strerror(errno));
+  }
   messageUnit_ = kNowhere;
 }
 
