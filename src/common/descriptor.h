@@ -2,6 +2,7 @@
 
 #include <cerrno>
 #include <unistd.h>
+#include <utility>
 
 namespace mirevo {
 
@@ -17,6 +18,12 @@ class Descriptor final {
   Descriptor(const Descriptor&) = delete;
   Descriptor& operator=(const Descriptor&) = delete;
   int get() const { return fd_; }
+  /// Closes it now. False, with the reason in errno, when what was written did not all arrive: a network file system
+  /// may tell only here that its disk is full.
+  bool close() {
+    const int fd = std::exchange(fd_, -1);
+    return fd < 0 || ::close(fd) == 0 || errno == EINTR;  // an interrupted one is closed all the same
+  }
 
  private:
   int fd_;

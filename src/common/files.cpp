@@ -8,6 +8,7 @@
 
 #include "common/descriptor.h"
 #include "common/descriptor_output.h"
+#include "common/fatal_error.h"
 
 namespace mirevo {
 namespace {
@@ -53,17 +54,26 @@ std::optional<std::string> readTextFile(const std::string& path, std::string& re
   return content;
 }
 
+std::optional<std::string> readFileIfThere(const std::string& path) {
+  std::string reason;
+  errno = 0;
+  auto content = readTextFile(path, reason);
+  if (!content && errno != ENOENT && errno != ENOTDIR) fatalError("Error: Unable to read " + path, reason);
+  return content;
+}
+
 bool writeByUnlinkAndCreate(const std::string& path, std::string_view content, unsigned mode, std::string& reason) {
   if (::unlink(path.c_str()) != 0 && errno != ENOENT) {
     reason = std::strerror(errno);
     return false;
   }
-  const Descriptor file(::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, mode & 07777));
+  Descriptor file(::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, mode & 07777));
   if (file.get() < 0 || ::fchmod(file.get(), mode & 07777) != 0) {
     reason = std::strerror(errno);
     return false;
   }
-  const int error = writeWhole(file.get(), content).error;
+  int error = writeWhole(file.get(), content).error;
+  if (error == 0 && !file.close()) error = errno;
   if (error != 0) reason = std::strerror(error);
   return error == 0;
 }

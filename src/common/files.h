@@ -14,6 +14,10 @@ std::string faultOfFile(const std::string& path);
 /// Folders, devices and pipes are refused like a file that cannot be read.
 std::optional<std::string> readTextFile(const std::string& path, std::string& reason);
 
+/// The whole content of a file; nothing where there is none. Throws FatalError, with the system's reason, where there
+/// is one that cannot be read: what it holds must not be taken for nothing.
+std::optional<std::string> readFileIfThere(const std::string& path);
+
 /// Text files that are written often and whole: removes `path` and creates it anew with `mode` and `content`. On ext4
 /// creating a file is an order of magnitude cheaper than truncating an existing one. False, with the system's reason,
 /// when that fails.

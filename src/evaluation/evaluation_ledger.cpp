@@ -56,13 +56,13 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
                   ? "Evaluation of parameter set No. % completed: FAILED - parameter constraints violated"
                   : "Evaluation of parameter set No. % completed: FAILED - model run error";
   }
+  std::optional<EvaluationResult> known;  // a repeated run has its row already, which stands
+  if (earlier_ != nullptr) known = earlier_->take(result.number, sets_[place]);
+  if (!known) observer_.recordEvaluation(sets_[place], result);
   observer_.message(withNumber(outcome, result.number));
-  if (earlier_ != nullptr) {
-    // A repeated run has its row already, which stands.
-    if (auto known = earlier_->take(result.number, sets_[place])) {
-      known->shownSeries = std::move(result.shownSeries);
-      return replay(place, std::move(*known));
-    }
+  if (known) {
+    known->shownSeries = std::move(result.shownSeries);
+    return replay(place, std::move(*known));
   }
   observer_.evaluationFinished(sets_[place], result);
   result.shownSeries = {};  // a batch keeps its results to its end

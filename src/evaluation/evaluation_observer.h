@@ -20,6 +20,12 @@ class EvaluationObserver {
   virtual void message(std::string_view text) = 0;
   /// A warning for the log alone.
   virtual void warning(std::string_view text) = 0;
+  /// Puts a finished evaluation on disk. Comes before anything tells of its end, so that nothing is reported as done
+  /// that a full disk or a kill could still take away.
+  virtual void recordEvaluation(std::span<const double> set, const EvaluationResult& result) {
+    static_cast<void>(set);
+    static_cast<void>(result);
+  }
   /// An evaluation has finished, in order of arrival; `set` is on the search scale. Called before its result is used.
   virtual void evaluationFinished(std::span<const double> set, const EvaluationResult& result) = 0;
   /// An evaluation has its result from an earlier run and not from the model. It counts like any other.

@@ -74,11 +74,6 @@ void removeFile(const std::string& path) {
   fatalError("Error: Unable to remove " + path, std::strerror(errno));
 }
 
-bool exists(const std::string& path) {
-  struct stat status {};
-  return ::stat(path.c_str(), &status) == 0;
-}
-
 }  // namespace
 
 ModelRunner::ModelRunner(ModelDescription description, ParameterModel& parameters, ObjectiveAggregator& aggregator,
@@ -257,7 +252,9 @@ void ModelRunner::keepFailedFolder(int slot, int number, std::vector<std::string
   try {
     makeProcessFolder(folder, kept, processFolderPrefix_);
     const std::string log = std::string("/") + kBatchLogName;  // no part of the model, so not copied with it
-    if (!exists(folder + log) || copyWhole(folder + log, kept + log, reason)) return;
+    struct stat status {};
+    const bool hasLog = ::stat((folder + log).c_str(), &status) == 0 || errno != ENOENT;
+    if (!hasLog || copyWhole(folder + log, kept + log, reason)) return;
   } catch (const FatalError& error) {
     reason = error.message();
   }
@@ -287,9 +284,12 @@ std::optional<EvaluationFailure> ModelRunner::findMissingResults(int slot) const
   std::vector<std::string> wanted = files.simulationFiles;
   if (!files.measureFile.empty()) wanted.push_back(files.measureFile);
   for (const std::string& path : wanted) {
-    if (!exists(path)) {
+    struct stat status {};
+    if (::stat(path.c_str(), &status) == 0) continue;
+    if (errno == ENOENT || errno == ENOTDIR) {
       return makeFailure(Kind::resultsNotWritten, "the batch ended well but did not write " + path, slot);
     }
+    return makeFailure(Kind::resultsNotReadable, fmt::format("{}: {}", path, std::strerror(errno)), slot);
   }
   return std::nullopt;
 }

@@ -45,8 +45,10 @@ std::vector<std::string> SavedFiles::save(const std::string& processFolder, int 
   std::vector<std::string> problems;
   if (names_.empty()) return problems;
   // What an interrupted run has kept of this evaluation is not this run's.
-  std::error_code ignored;
-  std::filesystem::remove_all(fmt::format("{}/{}", folder_, number), ignored);
+  std::error_code failedToRemove;
+  const std::string earlier = fmt::format("{}/{}", folder_, number);
+  std::filesystem::remove_all(earlier, failedToRemove);
+  if (failedToRemove) problems.push_back(fmt::format("{} was not removed: {}", earlier, failedToRemove.message()));
   for (const std::string& name : names_) {
     const std::string source = processFolder + name;
     const std::string target = fmt::format("{}/{}{}", folder_, number, name);

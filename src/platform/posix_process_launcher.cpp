@@ -179,13 +179,17 @@ void PosixProcessLauncher::prepareSlot(const LauncherSettings& settings, int num
                                        const std::vector<std::vector<std::string>>& arguments) {
   Slot& slot = slots_.emplace_back();
   slot.folder = settings.processFolderPrefix + std::to_string(settings.firstFolderNumber + number - 1);
-  std::error_code ignored;
-  const auto base = std::filesystem::weakly_canonical(settings.baseFolder, ignored);
-  if (liesIn(base, std::filesystem::weakly_canonical(slot.folder, ignored))) {
+  std::error_code failed;
+  const auto resolved = [&failed](const std::string& folder) {
+    auto path = std::filesystem::weakly_canonical(folder, failed);
+    if (failed) fatalError(fmt::format("Unable to look at {}: {}", folder, failed.message()));
+    return path;
+  };
+  if (liesIn(resolved(settings.baseFolder), resolved(slot.folder))) {
     fatalError(fmt::format("The model's folder {} lies in the process folder {}, which is made anew for every run",
                            settings.baseFolder, slot.folder));
   }
-  std::filesystem::create_directories(std::filesystem::path(slot.folder).parent_path(), ignored);
+  std::filesystem::create_directories(std::filesystem::path(slot.folder).parent_path(), failed);
   makeProcessFolder(settings.baseFolder, slot.folder, settings.processFolderPrefix);
   if (!renewLog(slot)) {
     fatalError(fmt::format("Unable to create {}/{}: {}", slot.folder, kBatchLogName, std::strerror(errno)));

@@ -102,7 +102,7 @@ void copyFile(const std::string& source, const std::string& target, const struct
   const Descriptor from(::open(source.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW));
   if (from.get() < 0 && hasVanished(errno)) return;
   if (from.get() < 0) fail("read", source, errno);
-  const Descriptor to(::open(target.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, S_IRUSR | S_IWUSR));
+  Descriptor to(::open(target.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, S_IRUSR | S_IWUSR));
   if (to.get() < 0) fail("create", target, errno);
   if (status.st_size > 0 && !copyContent(from.get(), to.get())) {
     const int error = errno;
@@ -112,6 +112,7 @@ void copyFile(const std::string& source, const std::string& target, const struct
   }
   if (::fchmod(to.get(), status.st_mode & 07777) != 0) fail("set the mode of", target, errno);
   copyTimes(to.get(), status);
+  if (!to.close()) fail("write", target, errno);
 }
 
 bool liesIn(const std::filesystem::path& path, const std::filesystem::path& folder) {

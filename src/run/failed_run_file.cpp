@@ -65,7 +65,7 @@ std::string FailedRunFile::headLine() const {
 
 std::map<int, EvaluationFailure> FailedRunFile::takeUp(const std::set<int>& numbers) {
   std::string reason;
-  const auto text = readTextFile(path_, reason);
+  const auto text = readFileIfThere(path_);
   if (!text || !text->starts_with(headLine())) {
     keepEarlierFile(path_);
     return {};

@@ -33,6 +33,9 @@ class FailedRunFile final {
   /// written.
   void add(std::span<const double> parameterValues, const EvaluationResult& result);
 
+  /// Throws FatalError when what was added did not all arrive.
+  void close() { file_.close(); }
+
  private:
   std::string headLine() const;
 

@@ -42,12 +42,11 @@ ProgressReporter::~ProgressReporter() {
   closeMessageFile();
 }
 
-void ProgressReporter::closeMessageFile() {
-  if (messageUnit_ > kStandardOutput) {
-    signalState.messageFileDescriptor = -1;
-    ::close(messageUnit_);
-  }
-  messageUnit_ = kNowhere;
+bool ProgressReporter::closeMessageFile() {
+  const int descriptor = std::exchange(messageUnit_, kNowhere);
+  if (descriptor <= kStandardOutput) return true;
+  signalState.messageFileDescriptor = -1;
+  return ::close(descriptor) == 0;
 }
 
 std::string ProgressReporter::progressInit(std::string_view runFileName, std::string_view destination) {
@@ -62,14 +61,14 @@ std::string ProgressReporter::progressInit(std::string_view runFileName, std::st
   } else if (destination == "STDOUT") {
     messageUnit_ = kStandardOutput;
   } else {
-    const std::string messageFile = baseName_ + std::string(kMessageFileEnding);
     // Without O_NONBLOCK the opening of a pipe would wait for its reader.
-    messageUnit_ = ::open(messageFile.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_APPEND | O_CLOEXEC | O_NONBLOCK, 0666);
+    messageUnit_ =
+        ::open(messageFile().c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_APPEND | O_CLOEXEC | O_NONBLOCK, 0666);
     if (messageUnit_ >= 0) {
       signalState.messageFileDescriptor = messageUnit_;
     } else {
       if (!problems.empty()) problems += '\n';
-      problems += fmt::format("Unable to open TqQmon2 message file: {}: {}", messageFile, std::strerror(errno));
+      problems += fmt::format("Unable to open TqQmon2 message file: {}: {}", messageFile(), std::strerror(errno));
     }
   }
   return problems;
@@ -95,7 +94,18 @@ void ProgressReporter::writeRecord(std::string_view kind, std::string_view text)
   isReaderBusy_ = result.error == EAGAIN;  // the record is lost
   if (result.taken > 0) isLineUnfinished_ = result.taken < record.size();
   // A full disk or a closed pipe ends the reporting and not the run.
-  if (result.error != 0 && !isReaderBusy_) closeMessageFile();
+  if (result.error != 0 && !isReaderBusy_) giveUp(result.error);
+}
+
+/// A full disk or a closed pipe ends the reporting and not the run.
+void ProgressReporter::giveUp(int error) {
+  const std::string name = messageUnit_ == kStandardOutput ? "standard output" : messageFile();
+  problem_ = fmt::format("Progress is no longer reported: unable to write to {}: {}", name, std::strerror(error));
+  closeMessageFile();
+}
+
+std::string ProgressReporter::messageFile() const {
+  return baseName_ + std::string(kMessageFileEnding);
 }
 
 void ProgressReporter::writeStatus(std::string_view text) {
@@ -165,7 +175,9 @@ void ProgressReporter::progressBest(int number, double aggregate, std::string_vi
 void ProgressReporter::progressEnd(std::string_view ending) {
   writeStatus(fmt::format("Ended: {}", ending));
   writeProgress("100.0");
-  closeMessageFile();
+  if (!closeMessageFile()) {
+    problem_ = fmt::format("The end of the run may not be in {}: {}", messageFile(), std::strerror(errno));
+  }
 }
 
 bool ProgressReporter::isCancelled() {

@@ -4,6 +4,7 @@
 #include <functional>
 #include <string>
 #include <string_view>
+#include <utility>
 
 namespace mirevo {
 
@@ -46,15 +47,23 @@ class ProgressReporter final {
   /// The last records; `ending` says how the run ended ("Normal termination").
   void progressEnd(std::string_view ending);
 
+  /// What there is to report since the last call: that records could not be written, with the system's reason, and are
+  /// written no more. Empty when all is well; the run goes on in any case.
+  std::string takeProblem() { return std::exchange(problem_, {}); }
+
   /// Whether the run was told to stop. Once it has been, it stays so and the disk is not asked again.
   bool isCancelled();
 
  private:
   void writeRecord(std::string_view kind, std::string_view text);
-  void closeMessageFile();
+  /// False, with errno set, when what was written may not be in the file.
+  bool closeMessageFile();
+  void giveUp(int error);
+  std::string messageFile() const;
 
   Clock clock_;
   std::string baseName_;
+  std::string problem_;
   int messageUnit_ = -1;           ///< < 0 nowhere, 0 standard output, > 0 the message file's descriptor
   bool isReaderBusy_ = false;      ///< it has not taken the latest record
   bool isLineUnfinished_ = false;  ///< it has taken a part of the latest that it took any of

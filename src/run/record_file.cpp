@@ -6,12 +6,14 @@
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
+#include <utility>
 
 #include <fmt/format.h>
 
 #include "common/descriptor.h"
 #include "common/fatal_error.h"
 #include "common/files.h"
+#include "platform/file_copy.h"
 #include "run/signal_handlers.h"
 
 namespace mirevo {
@@ -25,7 +27,8 @@ bool flushToDisk(const std::string& path) {
 }  // namespace
 
 RecordFile::~RecordFile() {
-  close();
+  std::string reason;
+  tryClose(reason);
 }
 
 void RecordFile::open(const std::string& path) {
@@ -44,7 +47,7 @@ void RecordFile::openWith(const std::string& path, int flags) {
   path_ = path;
   size_ = 0;
   failed_ = false;
-  descriptor_ = ::open(path.c_str(), O_WRONLY | O_CLOEXEC | flags, 0666);
+  descriptor_ = ::open(path.c_str(), O_RDWR | O_CLOEXEC | flags, 0666);
   if (descriptor_ < 0) fatalError("Error: Unable to open " + path, std::strerror(errno));
 }
 
@@ -59,6 +62,11 @@ bool RecordFile::tryAppend(std::string_view record, std::string& reason) {
     return false;
   }
   const EndingSignalsHeld held;  // a signal's closing line comes behind a whole record
+  if (!putBackIfRemoved(descriptor_, path_)) {
+    reason = std::string("it was removed and cannot be put back: ") + std::strerror(errno);
+    failed_ = true;
+    return false;
+  }
   const std::size_t length = record.size();
   while (!record.empty()) {
     const ssize_t written = ::write(descriptor_, record.data(), record.size());
@@ -77,8 +85,15 @@ bool RecordFile::tryAppend(std::string_view record, std::string& reason) {
 }
 
 void RecordFile::close() {
-  if (descriptor_ >= 0) ::close(descriptor_);
-  descriptor_ = -1;
+  std::string reason;
+  if (!tryClose(reason)) fatalError("Error: Unable to write to " + path_, reason);
+}
+
+bool RecordFile::tryClose(std::string& reason) {
+  const int descriptor = std::exchange(descriptor_, -1);
+  if (descriptor < 0 || ::close(descriptor) == 0 || errno == EINTR) return true;
+  reason = std::strerror(errno);
+  return false;
 }
 
 bool replaceFile(const std::string& path, std::string_view content, std::string& reason) {
@@ -96,7 +111,11 @@ bool replaceFile(const std::string& path, std::string_view content, std::string&
 
 std::string keepEarlierFile(const std::string& path) {
   struct stat status {};
-  if (::lstat(path.c_str(), &status) != 0 || !(S_ISREG(status.st_mode) || S_ISDIR(status.st_mode))) return {};
+  if (::lstat(path.c_str(), &status) != 0) {
+    if (errno == ENOENT || errno == ENOTDIR) return {};
+    fatalError("Error: Unable to keep the earlier file " + path, std::strerror(errno));
+  }
+  if (!S_ISREG(status.st_mode) && !S_ISDIR(status.st_mode)) return {};
   const std::size_t nameStart = path.rfind('/') == std::string::npos ? 0 : path.rfind('/') + 1;
   const std::size_t dot = path.rfind('.');
   const std::size_t stemEnd = dot == std::string::npos || dot <= nameStart ? path.size() : dot;

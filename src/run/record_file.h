@@ -28,7 +28,10 @@ class RecordFile final {
   /// Like append(), for the end of a run that fails already: false, with the system's reason, instead of an error.
   bool tryAppend(std::string_view record, std::string& reason);
 
+  /// Throws FatalError with the system's reason when what was written did not all arrive.
   void close();
+  /// Like close(): false, with the system's reason, instead of an error.
+  bool tryClose(std::string& reason);
 
   bool isOpen() const { return descriptor_ >= 0; }
   const std::string& path() const { return path_; }
@@ -52,7 +55,7 @@ bool replaceFile(const std::string& path, std::string_view content, std::string&
 
 /// Keeps an earlier run's file or folder from being overwritten: renames `path` to the first free of
 /// `<stem>.1<ending>`, `<stem>.2<ending>` ... and returns that name; empty when there is nothing to keep, or something
-/// that is neither (a device). Throws FatalError when it cannot be renamed.
+/// that is neither (a device). Throws FatalError when it cannot be looked at or renamed.
 std::string keepEarlierFile(const std::string& path);
 
 }  // namespace mirevo

@@ -121,8 +121,7 @@ RestartFiles restartFiles(const std::string& resultFile) {
 
 std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunConfig& config,
                                          const ResultColumns& columns) {
-  std::string reason;
-  const auto text = readTextFile(files.results, reason);
+  const auto text = readFileIfThere(files.results);
   ResultTable table = readResultTable(text.value_or(""));
   if (table.rows.empty()) return std::nullopt;
   const RestartSettings then = readSettings(files.settings);

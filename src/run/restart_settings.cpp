@@ -26,7 +26,8 @@ constexpr std::string_view kLastLine = "End";
 
 bool namesAFileOfResults(const ResultSetting& setting) {
   return setting.keyword == "BatchFileName" || setting.keyword == "TemplateFileName" ||
-         setting.keyword == "Initial_Sample_File_Name" || setting.section.ends_with("/OBSERVATION_FILE");
+         setting.keyword == "Initial_Sample_File_Name" ||
+         (setting.keyword == "File_Name" && setting.section.ends_with("/OBSERVATION_FILE"));
 }
 
 /// The first `count` cells of a line and the rest of it, which may hold tabs of its own.
@@ -113,8 +114,7 @@ RestartSettings restartSettings(const RunConfig& config) {
     const auto [entry, isNew] = known.try_emplace(setting.value);
     FileMark& mark = entry->second;
     if (isNew) {
-      std::string reason;
-      const auto content = readTextFile((std::filesystem::path(config.setupFolder) / setting.value).string(), reason);
+      const auto content = readFileIfThere((std::filesystem::path(config.setupFolder) / setting.value).string());
       if (content) mark = {{}, {}, {}, content->size(), checksumOf(*content)};
     }
     result.files.push_back({setting.section, setting.keyword, setting.value, mark.size, mark.check});

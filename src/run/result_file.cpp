@@ -99,11 +99,13 @@ bool ResultFile::finish(std::span<const std::string> closingLines, std::string& 
   const std::string closing = commentLines(closingLines);
   const bool isComplete = isInOrder() && aggregates_.empty();
   bool finished = isComplete ? file_.tryAppend(closing, reason) : rewriteInOrder(closing, reason);
-  if (!finished && !isComplete) {
-    std::string again;
-    file_.tryAppend(closing, again);  // better out of order than without its end
+  std::string again;
+  if (!finished && !isComplete) file_.tryAppend(closing, again);  // better out of order than without its end
+  // One that was put in order has another file in its place.
+  if (!file_.tryClose(again) && finished && isComplete) {
+    reason = again;
+    finished = false;
   }
-  file_.close();
   return finished;
 }
 

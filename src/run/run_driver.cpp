@@ -225,6 +225,7 @@ void RunDriver::reportRun(RunStateShown state, std::string_view message) {
 }
 
 void RunDriver::finish(const TaskOutcome& outcome) {
+  results_->close();
   std::string reason;
   if (!closeResults(outcome.terminationMessage, reason, outcome.report)) {
     fatalError("Error: Unable to write to " + results_->table().path(), reason);
@@ -246,7 +247,10 @@ void RunDriver::finish(const TaskOutcome& outcome) {
   signalState.runLogDescriptor = -1;
   leaveJob(0, kNormalTermination);
   state_.log.close();
-  state_.progress.progressEnd(kNormalTermination);
+  if (!state_.log.writeError().empty()) {
+    showMessage(fmt::format("Warning: The end of {} may be missing: {}", state_.log.path(), state_.log.writeError()));
+  }
+  endProgress(kNormalTermination);
 }
 
 /// Which reasons the run's failures had, and how often.
@@ -290,8 +294,13 @@ int RunDriver::endEarly(std::string_view ending) {
   state_.log.close();
   if (launcher_) launcher_->haltProcesses();
   leaveJob(1, ending);
-  state_.progress.progressEnd(ending);
+  endProgress(ending);
   return 1;
+}
+
+void RunDriver::endProgress(std::string_view ending) {
+  state_.progress.progressEnd(ending);
+  if (const std::string problem = state_.progress.takeProblem(); !problem.empty()) showMessage("Warning: " + problem);
 }
 
 void RunDriver::leaveJob(int exitCode, std::string_view ending) {

@@ -54,6 +54,7 @@ class RunDriver final {
   int endEarly(std::string_view ending);
   /// On an MPI master: stops the workers and finalises MPI; ends the whole job when that is not possible.
   void leaveJob(int exitCode, std::string_view ending);
+  void endProgress(std::string_view ending);
   std::vector<std::string> closingLines(std::string_view terminationMessage) const;
 
   RunState state_;

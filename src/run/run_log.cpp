@@ -4,6 +4,9 @@
 #include <cstring>
 #include <fcntl.h>
 #include <unistd.h>
+#include <utility>
+
+#include "platform/file_copy.h"
 
 namespace mirevo {
 
@@ -13,7 +16,7 @@ RunLog::~RunLog() {
 
 bool RunLog::open(const std::string& path, std::string& reason) {
   close();
-  const int descriptor = ::open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_APPEND | O_CLOEXEC, 0666);
+  const int descriptor = ::open(path.c_str(), O_RDWR | O_CREAT | O_TRUNC | O_APPEND | O_CLOEXEC, 0666);
   if (descriptor < 0) {
     reason = std::strerror(errno);
     return false;
@@ -27,8 +30,9 @@ bool RunLog::open(const std::string& path, std::string& reason) {
 }
 
 void RunLog::close() {
-  if (descriptor_ >= 0) ::close(descriptor_);
-  descriptor_ = -1;
+  const int descriptor = std::exchange(descriptor_, -1);
+  if (descriptor < 0 || ::close(descriptor) == 0 || errno == EINTR) return;
+  if (writeError_.empty()) writeError_ = std::strerror(errno);
 }
 
 void RunLog::line(std::string_view text) {
@@ -48,6 +52,7 @@ void RunLog::write(std::string_view record) {
     pending_ += record;
     return;
   }
+  putBackIfRemoved(descriptor_, path_);  // where that fails the log goes on where nobody sees it, and so may the run
   while (!record.empty()) {
     const ssize_t written = ::write(descriptor_, record.data(), record.size());
     if (written >= 0) {

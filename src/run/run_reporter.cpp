@@ -20,16 +20,21 @@ void RunReporter::warning(std::string_view text) {
   state_.log.warning(text);
 }
 
-void RunReporter::evaluationFinished(std::span<const double> set, const EvaluationResult& result) {
+void RunReporter::recordEvaluation(std::span<const double> set, const EvaluationResult& result) {
   const std::vector<double> values = ToModelScale(space_, set);
   // The row comes last: where it stands, all that belongs to it does, too, whenever the program is ended.
   if (!result.ok()) failedRuns_.add(values, result);
   if (result.ok() && simulatedValues_ != nullptr) simulatedValues_->add(result);
   results_.addRow(values, result);
+}
+
+void RunReporter::evaluationFinished(std::span<const double> set, const EvaluationResult& result) {
   if (!result.ok()) state_.log.line("   " + result.failure->reason);  // below the message that it failed
+  const std::vector<double> values = ToModelScale(space_, set);
   count(values, result, dateAndTimeWithZone());
   recordSeries(set, values, result);
   state_.progress.progressStep();
+  if (const std::string problem = state_.progress.takeProblem(); !problem.empty()) state_.log.warning(problem);
   requireLogWritten();
 }
 

@@ -31,6 +31,7 @@ class RunReporter final : public EvaluationObserver {
 
   void message(std::string_view text) override;
   void warning(std::string_view text) override;
+  void recordEvaluation(std::span<const double> set, const EvaluationResult& result) override;
   void evaluationFinished(std::span<const double> set, const EvaluationResult& result) override;
   void evaluationReplayed(std::span<const double> set, const EvaluationResult& result) override;
   bool isCancelled() override { return state_.progress.isCancelled(); }

@@ -66,6 +66,11 @@ void RunResults::open(const RunConfig& config, std::span<const ObservedSeries> o
   }
 }
 
+void RunResults::close() {
+  failedRuns_.close();
+  if (simulatedValues_) simulatedValues_->close();
+}
+
 void RunResults::beginAnew(const RunConfig& config, RunLog& log) {
   keepEarlierFile(failedRuns_.path());
   if (const std::string kept = keepEarlierFile(files_->results); !kept.empty()) {

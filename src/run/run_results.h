@@ -36,6 +36,9 @@ class RunResults final {
   void open(const RunConfig& config, std::span<const ObservedSeries> observed, const ObjectiveAggregator& aggregator,
             RunLog& log);
 
+  /// Closes what stands beside the table. Throws FatalError when what was written did not all arrive.
+  void close();
+
   ResultFile& table() { return table_; }
   FailedRunFile& failedRuns() { return failedRuns_; }
   /// nullptr where the task does not work with simulated values.

@@ -163,8 +163,9 @@ void SetupReader::readParameterFile(const SetupSection& section, std::size_t i) 
   }
   if (item.fileType == kNumericIdTemplate) return;
   std::string reason;
-  const std::string text = readTextFile(item.templateFileName, reason).value_or("");
-  const auto lines = splitLines(std::string_view(text).substr(0, text.find('\n')));
+  const auto text = readTextFile(item.templateFileName, reason);
+  if (!text) fatalError(std::string(kUnopened) + item.templateFileName, reason);
+  const auto lines = splitLines(std::string_view(*text).substr(0, text->find('\n')));
   if (lines.empty() || trim(lines.front()).empty()) {
     section.refuse("Error: Delimiter not defined in template file " + section.written("TemplateFileName"),
                    "TemplateFileName",

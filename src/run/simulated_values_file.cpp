@@ -60,7 +60,7 @@ void SimulatedValuesFile::add(const EvaluationResult& result) {
 
 std::map<int, std::vector<double>> SimulatedValuesFile::takeUp(const std::set<int>& numbers) {
   std::string reason;
-  const std::string content = readTextFile(path_, reason).value_or("");
+  const std::string content = readFileIfThere(path_).value_or("");
   std::string kept = head(valueCount_);
   std::map<int, std::vector<double>> found;
   const std::size_t contentLength = sizeof(std::int64_t) + valueCount_ * sizeof(double);

@@ -29,6 +29,8 @@ class SimulatedValuesFile final {
 
   /// The values of an evaluation that succeeded. Throws FatalError when they cannot be written.
   void add(const EvaluationResult& result);
+  /// Throws FatalError when what was added did not all arrive.
+  void close() { file_.close(); }
 
   const std::string& path() const { return path_; }
 

@@ -36,6 +36,7 @@ class RunReporterTest : public ::testing::Test {
     if (objective == kFailedRunValue) {
       result.failure = EvaluationFailure{EvaluationFailure::Kind::exitCode, "run.sh exited with code 3", {}};
     }
+    reporter_.recordEvaluation(std::span(&set, 1), result);
     reporter_.evaluationFinished(std::span(&set, 1), result);
   }
 
@@ -86,6 +87,7 @@ TEST_F(RunReporterTest, AggregatesUnknownOnArrivalAreFilledInWhenTheTransformati
     result.objectiveValues = {objective};
     result.aggregate = aggregator.aggregate(result.objectiveValues);
     const double set = 0.0;
+    reporter_.recordEvaluation(std::span(&set, 1), result);
     reporter_.evaluationFinished(std::span(&set, 1), result);
     return result.objectiveValues;
   };

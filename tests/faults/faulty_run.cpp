@@ -1,0 +1,259 @@
+#include "faults/faulty_run.h"
+
+#include <algorithm>
+#include <set>
+#include <sys/stat.h>
+
+namespace mirevo::testing {
+namespace {
+
+namespace fs = std::filesystem;
+
+/// The outputs of an "earlier run": each must be found again, under this name or a numbered one.
+const std::vector<std::string>& earlierFiles() {
+  static const std::vector<std::string> names = {"basin.log",           "basin.dat",          "basin_Optimisation.dat",
+                                                 "calSimErr.dat",       "basin_Band_1.csv",   "basin_Sensitivity.dat",
+                                                 "basin_Saved/1/a.csv", "basin_Process1/old", "basin._kill_"};
+  return names;
+}
+constexpr std::size_t kKeptEarlierFiles = 7;
+
+std::string readFile(const fs::path& path) {
+  std::ifstream file(path, std::ios::binary);
+  std::ostringstream content;
+  content << file.rdbuf();
+  return content.str();
+}
+
+/// Without what two runs of one setup may differ in.
+std::string withoutTimes(const std::string& text) {
+  std::string kept;
+  std::istringstream lines(text);
+  for (std::string line; std::getline(lines, line);) {
+    if (!line.starts_with("# Started:") && !line.starts_with("# Restarted:")) kept += line + '\n';
+  }
+  return kept;
+}
+
+std::string excerpt(const std::string& text) {
+  return text.size() < 600 ? text : text.substr(0, 300) + " ... " + text.substr(text.size() - 300);
+}
+
+/// The rows of a result file by their number, line ends included; `torn` is what stands behind the last line end.
+std::map<int, std::string> rowsOf(const std::string& text, std::string& torn) {
+  std::map<int, std::string> rows;
+  std::size_t begin = 0;
+  for (auto end = text.find('\n'); end != std::string::npos; end = text.find('\n', begin)) {
+    const std::string line = text.substr(begin, end + 1 - begin);
+    if (line[0] != '#' && !line.starts_with("Evaluation")) rows[std::atoi(line.c_str())] = line;
+    begin = end + 1;
+  }
+  torn = text.substr(begin);
+  return rows;
+}
+
+}  // namespace
+
+FaultyRun::FaultyRun(RunSettings settings, bool restarts, const std::string& modelScript)
+    : restarts_(restarts), marker_(folder_.path()) {
+  if (!modelScript.empty()) folder_.write("model/run.sh", modelScript, 0755);
+  folder_.write("model/data/table.txt", std::string(20'000, 'x'));
+  fs::create_symlink("data/table.txt", folder_ / "model/link");
+  folder_.writeSetup(settings);
+  if (restarts) {
+    std::string text = folder_.read("basin.kdx");
+    folder_.write("basin.kdx", text.insert(text.find("    Title = "), "    Restart = 1\n"));
+  }
+  resultFileName_ = settings.option == 2   ? "basin_Optimisation.dat"
+                    : settings.option == 1 ? "basin_Sensitivity.dat"
+                                           : "basin.dat";
+  for (const auto& entry : fs::directory_iterator(path())) inputs_.insert(entry.path().filename());
+}
+
+void FaultyRun::reset() const {
+  for (const auto& entry : fs::directory_iterator(path())) {
+    if (!inputs_.contains(entry.path().filename())) fs::remove_all(entry.path());
+  }
+  if (start_) {
+    fs::copy(start_->path(), path(), fs::copy_options::recursive | fs::copy_options::copy_symlinks);
+  } else {
+    for (const std::string& name : earlierFiles()) folder_.write(name, "earlier " + name + "\n");
+  }
+}
+
+void FaultyRun::startFromHere() {
+  start_ = std::make_unique<TemporaryFolder>();
+  for (const auto& entry : fs::directory_iterator(path())) {
+    if (inputs_.contains(entry.path().filename())) continue;
+    fs::copy(entry.path(), fs::path(start_->path()) / entry.path().filename(),
+             fs::copy_options::recursive | fs::copy_options::copy_symlinks);
+  }
+}
+
+std::set<int> FaultyRun::rowNumbers(const TemporaryFolder& folder) const {
+  std::string torn;
+  std::set<int> numbers;
+  for (const auto& [number, row] : rowsOf(folder.read(resultFileName_), torn)) {
+    if (!row.starts_with("earlier") && row != "<no file>") numbers.insert(number);
+  }
+  return numbers;
+}
+
+bool FaultyRun::makeReference(const Environment& environment) {
+  reset();
+  const ProgramResult result = run(environment);
+  if (result.exitCode != 0) {
+    fmt::print("The undisturbed run fails: {}\n", result.error);
+    return false;
+  }
+  reference_ = outputs();
+  return true;
+}
+
+RunningProgram FaultyRun::start(const Environment& environment, const std::vector<std::string>& prefix) const {
+  Environment marked = environment;
+  marked["FAULT_RUN"] = marker_;
+  if (prefix.empty()) return RunningProgram({setup()}, marked);
+  std::vector<std::string> arguments(prefix.begin() + 1, prefix.end());
+  arguments.insert(arguments.end(), {MIREVO_PROGRAM, setup()});
+  return RunningProgram(arguments, marked, prefix.front().c_str());
+}
+
+std::map<std::string, std::string> FaultyRun::outputs() const {
+  std::map<std::string, std::string> found;
+  for (const std::string& name : {std::string("calSimErr.dat"), std::string("basin_Band_1.csv"), resultFileName_}) {
+    if (folder_.exists(name)) found[name] = withoutTimes(folder_.read(name));
+  }
+  if (!folder_.exists("basin_Saved")) return found;
+  for (const auto& entry : fs::recursive_directory_iterator(folder_ / "basin_Saved")) {
+    if (entry.is_regular_file()) found[entry.path().lexically_relative(path())] = readFile(entry.path());
+  }
+  return found;
+}
+
+std::vector<std::string> FaultyRun::check(const ProgramResult& program, const Expectation& expected) const {
+  std::vector<std::string> problems = checkProcesses();
+  if (program.timedOut) problems.push_back("it does not end");
+  if (program.signal != 0 && !program.timedOut) problems.push_back(fmt::format("signal {}", program.signal));
+  checkMessage(program, expected, problems);
+  const auto add = [&problems](std::vector<std::string> more) {
+    problems.insert(problems.end(), more.begin(), more.end());
+  };
+  add(checkRows(expected));
+  add(checkEarlierFiles());
+  return problems;
+}
+
+void FaultyRun::checkMessage(const ProgramResult& program, const Expectation& expected,
+                             std::vector<std::string>& problems) const {
+  if (program.timedOut || program.signal != 0) return;
+  if (program.exitCode != 0 && program.exitCode != 1) problems.push_back(fmt::format("exit code {}", program.exitCode));
+  if (program.exitCode == 0 && expected.mayPassSilently && checkOutputs().empty()) return;
+  const auto isIn = [&](const std::string& text) {
+    const auto named = [&text](const std::string& name) { return text.find(name) != std::string::npos; };
+    return named(expected.reason) &&
+           (expected.names.empty() || std::any_of(expected.names.begin(), expected.names.end(), named));
+  };
+  // Errors are shown and logged; a warning of a run that goes on need only be in its log.
+  const std::string log = folder_.read("basin.log");
+  const bool toldElsewhere =
+      expected.mayFailEvaluation && program.error.find("described in calSimErr.dat") != std::string::npos;
+  if (program.exitCode != 0 && !isIn(program.error) && !toldElsewhere) {
+    problems.push_back("standard error does not tell of it: " + excerpt(program.error));
+  }
+  if (!isIn(log) && !expected.logMayLackMessage) {
+    problems.push_back(fmt::format("exit code {}, but the log does not tell of it: {}", program.exitCode,
+                                   excerpt(log.substr(log.size() > 500 ? log.size() - 500 : 0))));
+  }
+}
+
+std::vector<std::string> FaultyRun::checkRows(const Expectation& expected) const {
+  std::vector<std::string> problems;
+  const std::string text = folder_.read(resultFileName_);
+  if (text == "<no file>" || text.starts_with("earlier")) return problems;
+  std::string torn;
+  const auto rows = rowsOf(text, torn);
+  if (!torn.empty()) problems.push_back("the result file ends in a torn line: " + torn);
+  const auto wanted = rowsOf(reference_.at(resultFileName_), torn);
+  for (const auto& [number, row] : rows) {
+    const auto found = wanted.find(number);
+    if (found != wanted.end() && found->second == row) continue;
+    if (expected.mayFailEvaluation && row.find("\tFAILED\t") != std::string::npos) {
+      if (resultFileName_ == "basin_Optimisation.dat") break;  // a search goes another way from here
+      continue;
+    }
+    problems.push_back("a row of no undisturbed run: " + row);
+  }
+  if (start_) {
+    for (const int number : rowNumbers(*start_)) {
+      if (!rows.contains(number))
+        problems.push_back(fmt::format("evaluation {} of before the restart is lost", number));
+    }
+  }
+  if (expected.resultFileFails) return problems;
+  std::istringstream log(folder_.read("basin.log"));
+  for (std::string line; std::getline(log, line);) {
+    int number = 0;
+    std::array<char, 20> word{};
+    if (std::sscanf(line.c_str(), "Evaluation of parameter set No. %d completed: %19s", &number, word.data()) != 2)
+      continue;
+    if (!rows.contains(number))
+      problems.push_back(fmt::format("evaluation {} was reported as done and is lost", number));
+  }
+  return problems;
+}
+
+std::vector<std::string> FaultyRun::checkProcesses() const {
+  std::string names;
+  const auto noneIsLeft = [&] {
+    names.clear();
+    for (const auto& entry : fs::directory_iterator("/proc")) {
+      const std::string id = entry.path().filename();
+      if (id.find_first_not_of("0123456789") != std::string::npos || !isRunning(std::atoi(id.c_str()))) continue;
+      const std::string environment = readFile(entry.path() / "environ");
+      if (environment.find("FAULT_RUN=" + marker_) != std::string::npos) names += readFile(entry.path() / "comm");
+    }
+    return names.empty();
+  };
+  if (waitUntil(noneIsLeft, 3.0)) return {};
+  return {"processes are left: " + names};
+}
+
+std::vector<std::string> FaultyRun::checkOutputs() const {
+  std::vector<std::string> problems;
+  const auto found = outputs();
+  for (const auto& [name, content] : reference_) {
+    const auto other = found.find(name);
+    if (other == found.end() || other->second != content) problems.push_back("not as in an undisturbed run: " + name);
+  }
+  if (found.size() > reference_.size()) problems.push_back("more outputs than of an undisturbed run");
+  return problems;
+}
+
+std::vector<std::string> FaultyRun::checkEarlierFiles() const {
+  std::set<std::string> contents;
+  for (const auto& entry : fs::recursive_directory_iterator(path())) {
+    if (entry.is_regular_file() && entry.file_size() < 100) contents.insert(readFile(entry.path()));
+  }
+  std::vector<std::string> problems;
+  for (std::size_t i = 0; i < kKeptEarlierFiles; ++i) {
+    const std::string& name = earlierFiles()[i];
+    if (!contents.contains("earlier " + name + "\n")) problems.push_back("the earlier run's file is lost: " + name);
+  }
+  return problems;
+}
+
+std::vector<std::string> FaultyRun::checkNextRun() const {
+  const std::size_t known = rowNumbers(folder_).size();
+  const ProgramResult result = run({});
+  if (result.exitCode != 0) return {"the setup cannot be run again: " + excerpt(result.error)};
+  std::vector<std::string> problems = checkOutputs();
+  const std::string taken = fmt::format("Restart: {} evaluations are taken from", known);
+  if (restarts_ && known > 0 && folder_.read("basin.log").find(taken) == std::string::npos) {
+    problems.push_back(fmt::format("not all of the {} evaluations that stood were taken up", known));
+  }
+  for (std::string& problem : problems) problem = "the next run: " + problem;
+  return problems;
+}
+
+}  // namespace mirevo::testing

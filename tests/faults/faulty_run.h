@@ -1,0 +1,76 @@
+#pragma once
+
+#include <map>
+#include <memory>
+#include <set>
+#include <string>
+#include <vector>
+
+#include "integration/model_folder.h"
+
+namespace mirevo::testing {
+
+/// What a fault must be answered with.
+struct Expectation {
+  std::vector<std::string> names = {};  ///< the message names one of these files; none: it need not name one
+  std::string reason = {};              ///< the system's, "No space left on device"; empty: any
+  bool mayPassSilently = false;         ///< a run that ends well need not mention it
+  bool mayFailEvaluation = false;       ///< it makes a model run fail, and is told of where such are
+  bool logMayLackMessage = false;       ///< the log is what fails, or is not open yet
+  bool resultFileFails = false;         ///< rows that the log tells of may be missing from the result file
+};
+
+/// A folder with a setup on which faults are tried: the files of its undisturbed run are what every other is held
+/// against.
+class FaultyRun {
+ public:
+  using Environment = RunningProgram::Environment;
+
+  /// With `restarts` every run of the setup goes on from what the one before has left.
+  explicit FaultyRun(RunSettings settings, bool restarts = false, const std::string& modelScript = {});
+
+  const std::string& path() const { return folder_.path(); }
+  const ModelFolder& folder() const { return folder_; }
+  std::string setup() const { return folder_ / "basin.kdx"; }
+  const std::string& resultFileName() const { return resultFileName_; }
+
+  /// Removes what runs left and puts the outputs of an "earlier run" there, which must survive all that comes; or what
+  /// was there at startFromHere().
+  void reset() const;
+  /// From now on runs start from the folder as it is.
+  void startFromHere();
+  /// Runs the setup undisturbed from a fresh folder and keeps its outputs as the reference; false when it fails.
+  bool makeReference(const Environment& environment = {});
+  /// Runs the program once, in the marked environment by which its processes are found.
+  ProgramResult run(const Environment& environment, const std::vector<std::string>& prefix = {}) const {
+    return start(environment, prefix).wait();
+  }
+  /// The same by way of another program, `prefix`, which takes the command to run as its further arguments.
+  RunningProgram start(const Environment& environment, const std::vector<std::string>& prefix = {}) const;
+
+  /// What is wrong with a run that met a fault, besides what `program` says: whole rows, nothing lost, none left.
+  std::vector<std::string> check(const ProgramResult& program, const Expectation& expected) const;
+  /// What is wrong with running the setup once more, now undisturbed. A restart must take up every row that stands.
+  std::vector<std::string> checkNextRun() const;
+  /// What is wrong with the rows of the result file as it stands.
+  std::vector<std::string> checkRows(const Expectation& expected) const;
+  std::vector<std::string> checkProcesses() const;
+  std::vector<std::string> checkOutputs() const;
+
+ private:
+  std::map<std::string, std::string> outputs() const;
+  std::set<int> rowNumbers(const TemporaryFolder& folder) const;
+  void checkMessage(const ProgramResult& program, const Expectation& expected,
+                    std::vector<std::string>& problems) const;
+  std::vector<std::string> checkEarlierFiles() const;
+
+  ModelFolder folder_;
+  std::set<std::string> inputs_;  ///< the names in the folder before any run
+  bool restarts_;
+  std::unique_ptr<TemporaryFolder> start_;  ///< what reset() brings back
+  std::string resultFileName_;
+  std::string marker_;
+  std::map<std::string, std::string> reference_;
+};
+
+}  // namespace mirevo::testing

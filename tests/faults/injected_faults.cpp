@@ -1,0 +1,216 @@
+#include "faults/injected_faults.h"
+
+#include <algorithm>
+#include <cstring>
+#include <set>
+
+#include "faults/faulty_run.h"
+
+namespace mirevo::testing {
+namespace {
+
+/// A call of the undisturbed run: what is done to which file, named relative to the setup's folder.
+using Call = std::pair<std::string, std::string>;
+
+struct Fault {
+  Call call;
+  int number = 1;
+  int error = 0;
+  const char* how = "once";
+
+  std::string text() const { return fmt::format("{}\t{}\t{}\t{}\t{}", call.first, call.second, number, error, how); }
+};
+
+struct ErrorOfCall {
+  const char* call;
+  int error;
+  const char* how;
+};
+
+/// The errors that each call may meet in practice; the first of a call is the one that the short form tries.
+constexpr ErrorOfCall kErrors[] = {{"open-to-write", ENOSPC, "once"},
+                                   {"open-to-write", EACCES, "once"},
+                                   {"open-to-write", EMFILE, "lasting"},
+                                   {"open-to-read", EACCES, "once"},
+                                   {"open-to-read", EIO, "once"},
+                                   {"open-to-read", EMFILE, "lasting"},
+                                   {"write", ENOSPC, "short"},
+                                   {"write", EIO, "lasting"},
+                                   {"read", EIO, "once"},
+                                   {"close", EIO, "once"},
+                                   {"copy", ENOSPC, "lasting"},
+                                   {"fsync", EIO, "once"},
+                                   {"chmod", EPERM, "once"},
+                                   {"rename", EACCES, "once"},
+                                   {"rename", EIO, "once"},
+                                   {"mkdir", ENOSPC, "once"},
+                                   {"mkdir", EACCES, "once"},
+                                   {"unlink", EACCES, "once"},
+                                   {"rmdir", EBUSY, "once"},
+                                   {"symlink", EPERM, "once"},
+                                   {"readlink", EIO, "once"},
+                                   {"access", EACCES, "once"},
+                                   {"stat", EACCES, "once"},
+                                   {"stat", EIO, "lasting"},
+                                   {"set-times", EPERM, "once"},
+                                   {"open-folder", EMFILE, "lasting"},
+                                   {"read-folder", EIO, "once"},
+                                   {"fork", EAGAIN, "once"},
+                                   {"clone", EAGAIN, "once"},
+                                   {"clone", ENOMEM, "lasting"}};
+
+/// What may fail unmentioned, and why that is right.
+bool mayPassSilently(const Call& call) {
+  const auto& [name, path] = call;
+  if (name == "set-times") return true;                                    // a copy with other times is still a copy
+  if (name == "access" && path == "basin._kill_") return true;             // looked for again at once
+  if (path.ends_with("mirevo_batch.log")) return name != "open-to-write";  // made anew
+  if (name == "close" && (path == "basin._spi_" || path.ends_with("(deleted)"))) return true;  // another took its place
+  if (name == "open-to-read" && path == "basin.kdx") return true;  // to lock it; reading it follows
+  // What cannot be compared is written anew, beside the one of before.
+  if ((name == "read" || name == "open-to-read") && path.starts_with("basin_Band_")) return true;
+  if (name == "unlink" && path.ends_with(".part")) return true;  // where one is in the way, making it fails
+  return name == "stat";                                         // where it matters, the call that follows tells
+}
+
+std::string kindOf(const std::string& path) {
+  const auto isIn = [&path](const char* folder) { return path.starts_with(folder); };
+  if (path == "basin.kdx") return "setup file";
+  if (path.find("_Restart.dat") != std::string::npos) return "restart settings";
+  if (path.find("_Simulated.bin") != std::string::npos) return "simulated values";
+  if (isIn("basin.log") || isIn("basin.1.log")) return "run log";
+  if (path == "basin._spi_") return "message file";
+  if (path == "basin._kill_") return "kill file";
+  if (isIn("calSimErr")) return "failed-run file";
+  if (isIn("basin_Saved")) return "saved output files";
+  if (isIn("basin_Band_")) return "band file";
+  if (isIn("basin_Sensitivity")) return "sensitivity file";
+  if (isIn("basin.dat") || isIn("basin_Optimisation")) return "result file";
+  if (isIn("basin_Failed")) return "kept failed folders";
+  if (path == "(process)") return "starting processes";
+  if (path.ends_with("mirevo_batch.log")) return "batch log";
+  if (isIn("basin_Process") && path.ends_with("parameters.txt")) return "parameter file";
+  if (isIn("basin_Process") && path.ends_with("simulated.csv")) return "simulated series";
+  if (isIn("basin_Process")) return "process folder";
+  if (path == "observed.csv") return "observed series";
+  if (path.ends_with(".tpl")) return "template";
+  if (isIn("model")) return "model folder";
+  return "other files";
+}
+
+std::map<Call, int> countCalls(const std::string& record) {
+  std::map<Call, int> counts;
+  std::istringstream lines(record);
+  for (std::string line; std::getline(lines, line);) {
+    const auto tab = line.find('\t');
+    ++counts[{line.substr(0, tab), line.substr(tab + 1)}];
+  }
+  return counts;
+}
+
+/// Which of `count` calls fail: all of few, a spread of many.
+std::set<int> numbersToFail(int count, bool isLong) {
+  if (!isLong) return {(count + 1) / 2};
+  if (count <= 5) return {1, 2 <= count ? 2 : 1, 3 <= count ? 3 : 1, 4 <= count ? 4 : 1, count};
+  return {1, 2, count / 2, count - 1, count};
+}
+
+std::vector<Fault> faultsOf(const std::map<Call, int>& counts, bool isLong, std::set<std::string>& triedInShort) {
+  std::vector<Fault> faults;
+  for (const auto& [call, count] : counts) {
+    bool isFirstError = true;
+    for (const ErrorOfCall& error : kErrors) {
+      if (call.first != error.call || (!isLong && !isFirstError)) continue;
+      isFirstError = false;
+      if (!isLong && !triedInShort.insert(call.first + kindOf(call.second)).second) continue;
+      for (const int number : numbersToFail(count, isLong)) faults.push_back({call, number, error.error, error.how});
+    }
+  }
+  return faults;
+}
+
+Expectation expectationOf(const Fault& fault, const FaultyRun& run) {
+  const std::string& path = fault.call.second;
+  Expectation expected;
+  expected.reason = std::strerror(fault.error);
+  expected.mayPassSilently = mayPassSilently(fault.call);
+  expected.names.push_back(path == "(process)" ? fault.call.first == "fork" ? "guard" : "run.sh" : run.folder() / path);
+  for (const char* ending : {".tmp", ".part"}) {  // a file is written under this name first
+    if (path.ends_with(ending)) expected.names.push_back(expected.names[0].substr(0, expected.names[0].rfind('.')));
+  }
+  const std::string kind = kindOf(path);
+  expected.logMayLackMessage = kind == "run log" || (kind == "setup file" && run.folder().read("basin.log").empty());
+  expected.mayFailEvaluation = kind == "simulated series" || kind == "starting processes" || kind == "batch log";
+  expected.resultFileFails = path.starts_with(run.resultFileName());
+  return expected;
+}
+
+FaultyRun::Environment injection(const FaultyRun& run, const std::string& fault, const std::string& record) {
+  return {{"LD_PRELOAD", MIREVO_FAULT_INJECTOR},
+          {"FAULT_PROGRAM", MIREVO_PROGRAM},
+          {"FAULT_FOLDER", run.path()},
+          {"FAULT_RECORD", record},
+          {"FAULT", fault}};
+}
+
+/// Brings the folder into the state of a run that was killed in the middle of its evaluations, and has the calls of
+/// going on from there in the record.
+void leaveInterrupted(FaultyRun& run, const TemporaryFolder& records) {
+  const std::string calls = records.read("calls");
+  auto environment = injection(run, "", "");
+  const auto count = std::count(calls.begin(), calls.end(), '\n');
+  environment["FAULT_KILL"] = std::to_string(count * 3 / 4);
+  run.reset();
+  run.run(environment);
+  run.startFromHere();
+  std::filesystem::remove(records / "calls");
+  run.run(injection(run, "", records / "calls"));
+}
+
+}  // namespace
+
+void tryInjectedFaults(bool isLong, FaultReport& report) {
+  const std::string slowFirst =
+      fmt::format("#!/bin/sh\ngrep -q '^a = 1 ' parameters.txt && sleep 0.1\nexec {} \"$@\"\n", MIREVO_TEST_MODEL);
+  const std::vector<std::string> scenarios = {"1, 1, 1", "2, 1, 1", "3, 1, 1", "9, 1, 1", "4, 1, 1",
+                                              "5, 1, 1", "6, 1, 1", "2, 2, 1", "3, 2, 1", "4, 2, 1"};
+  struct Case {
+    RunSettings settings;
+    bool isRestart = false;  ///< goes on from a run that was killed
+  };
+  const Case cases[] = {
+      // Two slots, of which one is slow at first, so that the result file is put in order at its end; one failed run.
+      {{.option = 0, .scenarios = scenarios, .slots = 2, .modelArguments = "--fail-above 8"}},
+      {{.option = 2, .maxEvaluations = 6, .savedFile = "model/simulated.csv"}},
+      {{.option = 1}},
+      {{.option = 3, .maxEvaluations = 10}},
+      {{.option = 0, .scenarios = scenarios, .modelArguments = "--fail-above 8"}, true},
+      {{.option = 2, .maxEvaluations = 6, .savedFile = "model/simulated.csv"}, true},
+      {{.option = 3, .maxEvaluations = 10}, true}};
+  std::set<std::string> triedInShort;
+  for (const auto& [setting, isRestart] : cases) {
+    FaultyRun run(setting, isRestart, setting.slots > 1 ? slowFirst : "");
+    const TemporaryFolder records;
+    if (!run.makeReference(injection(run, "", records / "calls"))) {
+      report.tried("undisturbed run", fmt::format("option {}", setting.option), {"fails"});
+      continue;
+    }
+    if (isRestart) leaveInterrupted(run, records);
+    for (const Fault& fault : faultsOf(countCalls(records.read("calls")), isLong, triedInShort)) {
+      run.reset();
+      std::filesystem::remove(records / "trial");
+      const ProgramResult result = run.run(injection(run, fault.text(), records / "trial"));
+      if (records.read("trial").find("failed\t") == std::string::npos) continue;  // another slot took that run
+      std::vector<std::string> problems = run.check(result, expectationOf(fault, run));
+      const auto later = run.checkNextRun();
+      problems.insert(problems.end(), later.begin(), later.end());
+      report.tried(
+          kindOf(fault.call.second),
+          fmt::format("{} {}: {} {}, call {} ({}): {}", isRestart ? "restart of option" : "option", setting.option,
+                      fault.call.first, fault.call.second, fault.number, fault.how, std::strerror(fault.error)),
+          problems);
+    }
+  }
+}
+
+}  // namespace mirevo::testing

@@ -1,0 +1,132 @@
+#include "faults/interruptions.h"
+
+#include <algorithm>
+#include <random>
+
+#include "faults/faulty_run.h"
+
+namespace mirevo::testing {
+namespace {
+
+RunSettings settingsOf(int option) {
+  RunSettings settings{.option = option, .maxEvaluations = option == 2 ? 12 : 10};
+  if (option == 0) {
+    settings.scenarios = {"1, 1, 1", "2, 1, 1", "3, 1, 1", "9, 1, 1", "4, 1, 1",
+                          "5, 1, 1", "6, 1, 1", "2, 2, 1", "3, 2, 1", "4, 2, 1"};
+    settings.slots = 3;
+    settings.modelArguments = "--fail-above 8";
+  }
+  return settings;
+}
+
+FaultyRun::Environment injection(const FaultyRun& run) {
+  return {{"LD_PRELOAD", MIREVO_FAULT_INJECTOR}, {"FAULT_PROGRAM", MIREVO_PROGRAM}, {"FAULT_FOLDER", run.path()}};
+}
+
+void pauseMilliseconds(int milliseconds) {
+  const timespec pause{milliseconds / 1000, milliseconds % 1000 * 1'000'000L};
+  ::nanosleep(&pause, nullptr);
+}
+
+/// Killed before a system call on its files that is drawn at random; with `restarts` the next run goes on from there,
+/// and is itself killed every second time.
+void tryKills(int option, bool restarts, int count, FaultReport& report) {
+  FaultyRun run(settingsOf(option), restarts);
+  const TemporaryFolder records;
+  FaultyRun::Environment environment = injection(run);
+  environment["FAULT_RECORD"] = records / "calls";
+  run.makeReference(environment);
+  const std::string calls = records.read("calls");
+  std::mt19937 generator(static_cast<unsigned>(option));
+  const auto callCount = static_cast<unsigned long>(std::count(calls.begin(), calls.end(), '\n'));
+  for (int i = 0; i < count; ++i) {
+    const unsigned long moment = 1 + generator() % callCount;
+    environment = injection(run);
+    environment["FAULT_KILL"] = std::to_string(moment);
+    run.reset();
+    const ProgramResult result = run.run(environment);
+    if (result.signal != SIGKILL) continue;  // with several slots the number of calls is not always the same
+    auto problems = run.checkProcesses();
+    if (restarts && i % 2 == 1) run.run(environment);
+    for (const auto& more : {run.checkProcesses(), run.checkRows({}), run.checkNextRun()}) {
+      problems.insert(problems.end(), more.begin(), more.end());
+    }
+    report.tried(restarts ? "killed and restarted" : "killed",
+                 fmt::format("option {}, before call {} of {}", option, moment, callCount), problems);
+  }
+}
+
+/// The result file ends anywhere in its last two rows, as a machine that loses power leaves it.
+void tryCuts(int option, bool isLong, FaultReport& report) {
+  FaultyRun run(settingsOf(option), true);
+  run.makeReference();
+  std::string whole = run.folder().read(run.resultFileName());
+  // Up to the last row: closing lines are written by a run that ends orderly.
+  std::size_t end = whole.size();
+  while (whole[whole.rfind('\n', end - 2) + 1] == '#') end = whole.rfind('\n', end - 2) + 1;
+  whole.resize(end);
+  const std::size_t begin = whole.rfind('\n', whole.rfind('\n', end - 2) - 1) + 1;
+  run.startFromHere();
+  for (std::size_t length = begin; length <= end; length += isLong ? 1 : (end - begin) / 3) {
+    run.reset();
+    run.folder().write(run.resultFileName(), whole.substr(0, length));
+    const ProgramResult result = run.run({});
+    auto problems = run.checkOutputs();
+    if (result.exitCode != 0) problems.push_back(fmt::format("exit code {}: {}", result.exitCode, result.error));
+    const std::string log = run.folder().read("basin.log");
+    const auto rows =
+        std::count(whole.begin(), whole.begin() + static_cast<std::ptrdiff_t>(length), '\n') -
+        std::count(whole.begin(), whole.begin() + static_cast<std::ptrdiff_t>(whole.find("\n1\t")), '\n') - 1;
+    if (log.find(fmt::format("Restart: {} evaluations are taken from", rows)) == std::string::npos) {
+      problems.push_back(fmt::format("not all of the {} whole rows were taken up", rows));
+    }
+    report.tried("result file cut", fmt::format("option {}, to {} of {} bytes", option, length, end), problems);
+  }
+}
+
+void tryStops(int count, FaultReport& report) {
+  FaultyRun run(settingsOf(2));
+  run.makeReference();
+  for (int i = 0; i < count; ++i) {
+    run.reset();
+    RunningProgram program = run.start({});
+    pauseMilliseconds(10 + 7 * i);
+    program.send(SIGSTOP);
+    pauseMilliseconds(60);
+    program.send(SIGCONT);
+    const ProgramResult result = program.wait();
+    auto problems = run.check(result, {.mayPassSilently = true});
+    if (result.exitCode != 0) problems.push_back(fmt::format("exit code {}", result.exitCode));
+    report.tried("stopped and continued", fmt::format("after {} ms", 10 + 7 * i), problems);
+  }
+}
+
+void tryClocks(FaultReport& report) {
+  for (const int option : {0, 2}) {
+    FaultyRun run(settingsOf(option));
+    run.makeReference();
+    for (const char* step : {"1", "3600", "-86400", "31557600", "2000000000"}) {
+      FaultyRun::Environment environment = injection(run);
+      environment["FAULT_CLOCK"] = step;
+      run.reset();
+      const ProgramResult result = run.run(environment);
+      auto problems = run.check(result, {.mayPassSilently = true});
+      if (result.exitCode != 0) problems.push_back(fmt::format("exit code {}", result.exitCode));
+      report.tried("clock set back", fmt::format("option {}, by {} s at each look", option, step), problems);
+    }
+  }
+}
+
+}  // namespace
+
+void tryInterruptions(bool isLong, FaultReport& report) {
+  for (const int option : {0, 1, 2, 3}) {
+    tryKills(option, false, isLong ? 25 : 1, report);
+    tryKills(option, true, isLong ? 100 : 3, report);
+    tryCuts(option, isLong, report);
+  }
+  tryStops(isLong ? 40 : 3, report);
+  tryClocks(report);
+}
+
+}  // namespace mirevo::testing

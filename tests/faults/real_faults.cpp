@@ -1,0 +1,254 @@
+#include "faults/real_faults.h"
+
+#include <cerrno>
+#include <cstring>
+#include <memory>
+#include <sched.h>
+#include <sys/mount.h>
+#include <sys/statfs.h>
+
+#include "faults/faulty_run.h"
+
+namespace mirevo::testing {
+namespace {
+
+namespace fs = std::filesystem;
+
+/// A user with no files and no processes.
+constexpr unsigned kNobody = 64'123;
+
+const RunSettings kSearch{.option = 2, .maxEvaluations = 6, .savedFile = "model/simulated.csv"};
+
+/// `command` is a shell's, before the program takes the shell's place.
+std::vector<std::string> throughShell(const std::string& command) {
+  return {"/bin/sh", "-c", command + "; exec \"$@\"", "sh"};
+}
+
+std::vector<std::string> asNobody(std::vector<std::string> command = {}) {
+  std::vector<std::string> prefix = {"setpriv", fmt::format("--reuid={}", kNobody), fmt::format("--regid={}", kNobody),
+                                     "--clear-groups"};
+  prefix.insert(prefix.end(), command.begin(), command.end());
+  return prefix;
+}
+
+void giveToNobody(const FaultyRun& run) {
+  if (::lchown(run.path().c_str(), kNobody, kNobody) != 0) throw std::runtime_error(std::strerror(errno));
+  for (const auto& entry : fs::recursive_directory_iterator(run.path())) {
+    if (::lchown(entry.path().c_str(), kNobody, kNobody) != 0) throw std::runtime_error(std::strerror(errno));
+  }
+}
+
+/// Whether that user can run the program at all.
+bool nobodyCanRun() {
+  std::vector<std::string> arguments = asNobody();
+  arguments.erase(arguments.begin());
+  arguments.insert(arguments.end(), {MIREVO_PROGRAM, "--version"});
+  return ::geteuid() == 0 && RunningProgram(arguments, {}, "setpriv").wait().exitCode == 0;
+}
+
+void tryForbiddenFiles(FaultReport& report) {
+  struct Case {
+    const char* path;
+    unsigned mode;
+    const char* named;
+    bool isBeforeLog;
+  };
+  constexpr Case kCases[] = {{"basin.kdx", 0000, "basin.kdx", false},
+                             {"model", 0000, "model", false},
+                             {"model/parameters.tpl", 0000, "model/parameters.tpl", false},
+                             {"model/parameters.txt", 0000, "model/parameters.txt", false},
+                             {"model/data/table.txt", 0000, "model/data/table.txt", false},
+                             {"model/run.sh", 0000, "model/run.sh", false},
+                             {"model/data", 0000, "model/data", false},
+                             {"observed.csv", 0000, "observed.csv", false},
+                             {"basin_Process1", 0555, "basin_Process1", false},
+                             {".", 0555, "basin.log", true}};
+  if (!nobodyCanRun()) {
+    report.skipped("forbidden files", "it takes root to become a user who may not read all");
+    return;
+  }
+  FaultyRun run(kSearch);
+  run.makeReference();
+  for (const Case& forbidden : kCases) {
+    run.reset();
+    giveToNobody(run);
+    const std::string path = run.folder() / forbidden.path;
+    struct stat before {};
+    ::stat(path.c_str(), &before);
+    ::chmod(path.c_str(), forbidden.mode);
+    // A folder that the program may make writable is not forbidden to it.
+    if (forbidden.path == std::string("basin_Process1") && ::lchown(path.c_str(), 0, 0) != 0) continue;
+    const ProgramResult result = run.run({}, asNobody());
+    auto problems = run.check(result, {.names = {run.folder() / forbidden.named},
+                                       .reason = "Permission denied",
+                                       .logMayLackMessage = forbidden.isBeforeLog});
+    if (result.exitCode != 1) problems.push_back(fmt::format("exit code {}", result.exitCode));
+    ::chmod(path.c_str(), before.st_mode & 07777);
+    const auto later = run.checkNextRun();
+    problems.insert(problems.end(), later.begin(), later.end());
+    report.tried("forbidden files", fmt::format("{} with mode {:o}", forbidden.path, forbidden.mode), problems);
+  }
+}
+
+/// Runs under ever higher limits until two runs in a row are undisturbed.
+void tryLimit(FaultReport& report, const std::string& kind, const char* option, int first, int step, int last,
+              const Expectation& expected, bool isNobody) {
+  FaultyRun run(kSearch);
+  run.makeReference();
+  int undisturbed = 0;
+  for (int limit = first; limit <= last && undisturbed < 2; limit += step) {
+    const std::string command = fmt::format("ulimit -{} {}", option, limit);
+    const auto prefix = isNobody ? asNobody(throughShell(command)) : throughShell(command);
+    run.reset();
+    if (isNobody) giveToNobody(run);
+    const ProgramResult result = run.run({}, prefix);
+    if (result.exitCode > 1) continue;  // too little to load the program
+    auto problems = run.check(result, expected);
+    const auto later = run.checkNextRun();
+    problems.insert(problems.end(), later.begin(), later.end());
+    report.tried(kind, command, problems);
+    undisturbed = result.exitCode == 0 && run.checkOutputs().empty() ? undisturbed + 1 : 0;
+  }
+}
+
+void tryLimits(bool isLong, FaultReport& report) {
+  Expectation expected{.reason = "Too many open files", .mayPassSilently = true, .mayFailEvaluation = true};
+  expected.logMayLackMessage = true;  // it may be what cannot be opened
+  tryLimit(report, "descriptors exhausted", "n", 3, isLong ? 1 : 4, 60, expected, false);
+  // The model says it in its own words, or is ended by the signal.
+  expected.reason.clear();
+  expected.names = {"File too large", "cannot write", "File size limit"};
+  expected.resultFileFails = true;
+  tryLimit(report, "file size limit", "f", 4, isLong ? 1 : 6, 60, expected, false);
+  if (!nobodyCanRun()) {
+    report.skipped("processes exhausted", "it takes root to become a user without other processes");
+    return;
+  }
+  expected.names = {"Resource temporarily unavailable"};
+  expected.resultFileFails = false;
+  tryLimit(report, "processes exhausted", "u", 1, 1, 8, expected, true);
+}
+
+/// A small disk of its own, seen by this process and those that it starts.
+class SmallDisk {
+ public:
+  SmallDisk() {
+    isThere_ = ::unshare(CLONE_NEWNS) == 0 && ::mount("none", "/", nullptr, MS_REC | MS_PRIVATE, nullptr) == 0 &&
+               ::mount("tmpfs", folder_.path().c_str(), "tmpfs", 0, "size=64m") == 0;
+    reason_ = isThere_ ? "" : std::strerror(errno);
+  }
+  ~SmallDisk() {
+    if (isThere_) ::umount2(folder_.path().c_str(), MNT_DETACH);
+  }
+  SmallDisk(const SmallDisk&) = delete;
+  SmallDisk& operator=(const SmallDisk&) = delete;
+  bool isThere() const { return isThere_; }
+  const std::string& reason() const { return reason_; }
+  const std::string& path() const { return folder_.path(); }
+
+  /// Leaves room for so many blocks of 4096 bytes, or for so many files; negative: for plenty.
+  bool leave(int blocks, int files) const {
+    struct statfs status {};
+    ::statfs(folder_.path().c_str(), &status);
+    const auto usedBlocks = status.f_blocks - status.f_bfree;
+    const auto usedFiles = status.f_files - status.f_ffree;
+    const std::string options =
+        fmt::format("size={}k,nr_inodes={}", blocks < 0 ? 65536 : 4 * (usedBlocks + static_cast<unsigned>(blocks)),
+                    files < 0 ? 100'000 : usedFiles + static_cast<unsigned>(files));
+    return ::mount("tmpfs", folder_.path().c_str(), "tmpfs", MS_REMOUNT, options.c_str()) == 0;
+  }
+
+ private:
+  TemporaryFolder folder_;
+  bool isThere_ = false;
+  std::string reason_;
+};
+
+void tryFullDisk(bool isLong, FaultReport& report) {
+  const SmallDisk disk;
+  if (!disk.isThere()) {
+    report.skipped("full disk", "no disk of its own can be mounted: " + disk.reason());
+    return;
+  }
+  for (const int option : {0, 1, 2, 3}) {
+    if (!isLong && option != 2) continue;
+    RunSettings settings{.option = option, .maxEvaluations = option == 3 ? 10 : 6, .savedFile = "model/simulated.csv"};
+    if (option == 0) settings.scenarios = {"1, 1, 1", "2, 2, 1", "3, 1, 1"};
+    ::setenv("TMPDIR", disk.path().c_str(), 1);
+    const auto run = std::make_unique<FaultyRun>(settings);
+    ::unsetenv("TMPDIR");
+    run->makeReference();
+    for (const bool isFiles : {false, true}) {
+      int undisturbed = 0;
+      for (int room = 0; room < 200 && undisturbed < 2; room += isLong ? 1 : 7) {
+        run->reset();
+        if (!disk.leave(isFiles ? -1 : room, isFiles ? room : -1)) throw std::runtime_error(std::strerror(errno));
+        const ProgramResult result = run->run({});
+        disk.leave(-1, -1);
+        // The log is on the same disk; a model that cannot write says so in its own words.
+        auto problems = run->check(result, {.names = {"No space left on device", "cannot write"},
+                                            .mayPassSilently = true,
+                                            .mayFailEvaluation = true,
+                                            .logMayLackMessage = result.exitCode == 1,
+                                            .resultFileFails = true});
+        undisturbed = result.exitCode == 0 && run->checkOutputs().empty() ? undisturbed + 1 : 0;
+        const auto later = run->checkNextRun();
+        problems.insert(problems.end(), later.begin(), later.end());
+        report.tried("full disk", fmt::format("option {}, room for {} {}", option, room, isFiles ? "files" : "blocks"),
+                     problems);
+      }
+    }
+  }
+}
+
+/// The model itself removes, in its third run, what the program works with.
+void tryRemovedFiles(FaultReport& report) {
+  struct Case {
+    const char* removed;
+    const char* named;  ///< the message names it; null: the run does not need it any more
+    const char* reason;
+  };
+  constexpr Case kCases[] = {{"model", nullptr, ""},
+                             {"observed.csv", nullptr, ""},
+                             {"basin.kdx", nullptr, ""},
+                             {"basin._spi_", nullptr, ""},
+                             {"basin_Saved", nullptr, ""},
+                             {"basin_Process1", "basin_Process1/simulated.csv", ""},
+                             {"basin_Process1/parameters.txt", "basin_Process1/parameters.txt", "No such file"},
+                             {"basin_Process1/run.sh", "run.sh", "No such file or directory"},
+                             {"basin_Optimisation.dat", nullptr, ""},
+                             {"basin.log", nullptr, ""}};
+  for (const Case& removal : kCases) {
+    const TemporaryFolder outside;
+    FaultyRun run(RunSettings{.option = 2, .maxEvaluations = 6}, false,
+                  fmt::format("#!/bin/sh\necho >> {1}/count\n{0} \"$@\" || exit 1\n"
+                              "test -e {1}/armed && test `wc -l < {1}/count` -eq 3 && rm -rf \"`cat {1}/armed`\"\n"
+                              "exit 0\n",
+                              MIREVO_TEST_MODEL, outside.path()));
+    run.makeReference();
+    fs::remove(outside / "count");
+    outside.write("armed", run.folder() / removal.removed);
+    run.reset();
+    const ProgramResult result = run.run({});
+    Expectation expected{.reason = removal.reason, .mayPassSilently = removal.named == nullptr};
+    if (removal.named != nullptr) expected.names = {removal.named};
+    expected.mayFailEvaluation = true;
+    auto problems = run.check(result, expected);
+    if (result.exitCode != (removal.named == nullptr ? 0 : 1)) {
+      problems.push_back(fmt::format("exit code {}", result.exitCode));
+    }
+    if (run.folder().read("basin.log").find("Setup file:") == std::string::npos) problems.push_back("the log is lost");
+    report.tried("files removed during the run", removal.removed, problems);
+  }
+}
+
+}  // namespace
+
+void tryRealFaults(bool isLong, FaultReport& report) {
+  tryForbiddenFiles(report);
+  tryLimits(isLong, report);
+  tryRemovedFiles(report);
+  tryFullDisk(isLong, report);
+}
+
+}  // namespace mirevo::testing
