@@ -1,6 +1,6 @@
 /// Prints the tables of docs/algorithms/search-comparison.md. Usage: search_comparison [table], where the table is
-/// "success", "budget" or "surrogate"; all of them without an argument. Every trial has its own seed, 1, 2, 3, ..., so
-/// that the figures are the same on every run.
+/// "success", "budget", "complexes" or "surrogate"; all of them without an argument. Every trial has its own seed, 1,
+/// 2, 3, ..., so that the figures are the same on every run.
 
 #include <algorithm>
 #include <functional>
@@ -36,6 +36,8 @@ struct Setting {
   int samplingRate = 100;  ///< below 100 with the surrogate model
   int modelType = 0;
   bool stopsAtTarget = false;
+  int extraPoints = 0;               ///< points per complex beyond n + 1; 0: n, that is, 2n + 1 points
+  bool goesOnWhenConverged = false;  ///< up to the budget, whatever the stopping tests say
 };
 
 struct Outcome {
@@ -62,15 +64,19 @@ Outcome runTrial(const TestFunction& function, const Setting& setting, int seed)
                               setting.samplingRate < 100 ? &selector : nullptr};
   std::unique_ptr<SearchAlgorithm> search;
   if (setting.method == Method::sce) {
-    search =
-        std::make_unique<Sce>(SceSettings{setting.complexes, 2 * n + 1, 2 * n + 1}, SimplexSettings{n + 1}, problem);
+    const int points = n + 1 + (setting.extraPoints > 0 ? setting.extraPoints : n);
+    search = std::make_unique<Sce>(SceSettings{setting.complexes, points, points}, SimplexSettings{n + 1}, problem);
   } else if (setting.method == Method::pse) {
     search = std::make_unique<Pse>(PseSettings{setting.complexes * (2 * n + 1)}, SimplexSettings{n + 1}, problem);
   } else {
     search = std::make_unique<Dds>(DdsSettings{}, setting.budget, false, bounds, evaluator, random);
   }
   if (search->initialise() != kSearchOk) return {};
-  while (!search->isTerminated() && !(setting.stopsAtTarget && evaluator.hasHitTarget())) {
+  const auto isOver = [&] {
+    if (setting.stopsAtTarget && evaluator.hasHitTarget()) return true;
+    return setting.goesOnWhenConverged ? evaluator.evaluations >= setting.budget : search->isTerminated();
+  };
+  while (!isOver()) {
     if (search->advance() != kSearchOk) return {};
   }
   return {evaluator.hasHitTarget(), evaluator.evaluationsToTarget, search->summary().bestResult.aggregate};
@@ -143,6 +149,24 @@ void printBudget() {
   }
 }
 
+void printSmallComplexes() {
+  for (const bool goesOn : {false, true}) {
+    fmt::print("\nMean / median best value of SCE with 5 complexes after 5000 evaluations over {} trials{}\n\n",
+               kTrials, goesOn ? ", converged populations going on" : "");
+    fmt::print("| function | m = n + 2 | m = n + 4 | m = n + 6 | m = 2n + 1 |\n|---|---|---|---|---|\n");
+    for (const std::string name : {"Griewank 10-D", "Ackley 10-D", "Rastrigin 10-D", "Rosenbrock 10-D"}) {
+      const TestFunction function = testing::testFunction(name);
+      fmt::print("| {} |", name);
+      for (const int extraPoints : {1, 3, 5, 0}) {
+        const Setting setting{
+            .complexes = 5, .budget = 5000, .extraPoints = extraPoints, .goesOnWhenConverged = goesOn};
+        fmt::print(" {} |", meanAndMedianText(runTrials(function, setting, false, kTrials)));
+      }
+      fmt::print("\n");
+    }
+  }
+}
+
 void printSurrogate() {
   fmt::print("\nSuccesses of {} / mean evaluations of the successful, shifted optimum, 4 complexes\n\n",
              kSurrogateTrials);
@@ -169,6 +193,7 @@ int main(int argc, char** argv) {
   const std::string table = argc > 1 ? argv[1] : "";
   if (table.empty() || table == "success") mirevo::printSuccess();
   if (table.empty() || table == "budget") mirevo::printBudget();
+  if (table.empty() || table == "complexes") mirevo::printSmallComplexes();
   if (table.empty() || table == "surrogate") mirevo::printSurrogate();
   return 0;
 }
