@@ -33,7 +33,7 @@ int makeReport(const std::string& setupFileName) {
     showMessage("Error: Unable to write the report of " + setupFileName + "\n" + reason);
     return 1;
   }
-  fmt::print("{}_Report.html\n", filePrefix);
+  fmt::print("{}\n", reportPath(filePrefix));
   return 0;
 }
 

@@ -155,6 +155,10 @@ void RunDriver::logSetup() {
 
 void RunDriver::openResults() {
   state_.objectiveValues.resize(config_.objectives.size());
+  // Were the run killed, the report of an earlier one would else pass for its own.
+  if (const std::string kept = keepEarlierFile(reportPath(filePrefix_)); !kept.empty()) {
+    state_.log.line("The report of the earlier run was kept as " + kept);
+  }
   results_->open(config_, runner_->observedSeries(), *aggregator_, state_.log);
   signalState.resultFileDescriptor = results_->table().descriptor();
   reporter_ = std::make_unique<RunReporter>(state_, results_->table(), results_->failedRuns(),

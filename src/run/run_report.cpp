@@ -27,6 +27,7 @@
 #include "run/run_lock.h"
 #include "run/search_factory.h"
 #include "run/setup_summary.h"
+#include "run/signal_handlers.h"
 #include "run/tasks.h"
 #include "run/version.h"
 
@@ -216,6 +217,8 @@ void ReportBuilder::addEnding(const std::optional<RunEnding>& ending) {
   const std::string message = toLowerAscii(run.message);
   if (message.ends_with("simulation cancelled")) {
     run.state = RunStateShown::cancelled;
+  } else if (isEndingRequest(run.message)) {
+    run.state = RunStateShown::cutOff;
   } else {
     const bool isEnd = message.starts_with("normal termination") || message.starts_with("optimisation terminated");
     run.state = isEnd ? RunStateShown::finished : RunStateShown::failed;
@@ -384,6 +387,10 @@ void ReportBuilder::addSeries() {
 
 }  // namespace
 
+std::string reportPath(const std::string& filePrefix) {
+  return filePrefix + "_Report.html";
+}
+
 std::optional<ReportData> buildReport(const RunConfig& config, const std::string& filePrefix,
                                       const std::optional<RunEnding>& ending, std::string& reason) {
   ReportBuilder builder(config, filePrefix);
@@ -395,7 +402,7 @@ bool writeReport(const RunConfig& config, const std::string& filePrefix, const s
                  std::string& reason) noexcept {
   try {
     const std::optional<ReportData> data = buildReport(config, filePrefix, ending, reason);
-    return data && writeWhole(filePrefix + "_Report.html", reportPage(reportPageTemplate(), *data), reason);
+    return data && writeWhole(reportPath(filePrefix), reportPage(reportPageTemplate(), *data), reason);
   } catch (const FatalError& error) {
     reason = error.message() + "\n" + error.detail();
   } catch (const std::exception& error) {

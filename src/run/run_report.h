@@ -17,13 +17,16 @@ struct RunEnding {
   std::string message;
 };
 
+/// `<filePrefix>_Report.html`.
+std::string reportPath(const std::string& filePrefix);
+
 /// What a report shows of a setup's run, from its files beside the setup (`filePrefix`: folder and name without
 /// ".kdx"). Without an `ending` the files and the run's lock say how it went. Nothing, with the reason, where there are
 /// no results.
 std::optional<ReportData> buildReport(const RunConfig& config, const std::string& filePrefix,
                                       const std::optional<RunEnding>& ending, std::string& reason);
 
-/// Builds the report and writes it to `<filePrefix>_Report.html`. False, with the reason, when that fails; never
+/// Builds the report and writes it to its path. False, with the reason, when that fails; never
 /// throws.
 bool writeReport(const RunConfig& config, const std::string& filePrefix, const std::optional<RunEnding>& ending,
                  std::string& reason) noexcept;

@@ -93,6 +93,7 @@ void RunReporter::settle(const ObjectiveAggregator& aggregator) {
   for (const Unsettled& evaluation : unsettled_) {
     const double aggregate = aggregator.aggregate(evaluation.objectiveValues);
     results_.replaceAggregate(evaluation.number, aggregate);
+    if (recorder_ != nullptr) recorder_->aggregateSettled(evaluation.number, aggregate);
     considerAsBest(evaluation.number, aggregate, evaluation.parameterValues, dateAndTimeWithZone());
   }
   unsettled_.clear();

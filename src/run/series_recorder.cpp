@@ -104,6 +104,12 @@ void SeriesRecorder::follow(const std::optional<BestEvaluation>& best, const Hel
   isChanged_ = true;
 }
 
+void SeriesRecorder::aggregateSettled(int number, double aggregate) {
+  if (!initial_ || initial_->evaluation.number != number) return;
+  initial_->evaluation.aggregate = aggregate;
+  isChanged_ = true;
+}
+
 void SeriesRecorder::finish(const std::optional<BestEvaluation>& best) {
   try {
     follow(best, nullptr);

@@ -39,6 +39,9 @@ class SeriesRecorder final {
   void evaluationFinished(const EvaluationResult& result, std::span<const double> values, bool hasInitialParameters,
                           const std::optional<BestEvaluation>& best);
 
+  /// The aggregate of an evaluation that was not known when it finished.
+  void aggregateSettled(int number, double aggregate);
+
   /// At the run's end: writes what is not written yet, and never throws. `best` is the run's best evaluation.
   void finish(const std::optional<BestEvaluation>& best);
 

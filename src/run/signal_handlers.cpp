@@ -16,6 +16,9 @@
 namespace mirevo {
 namespace {
 
+constexpr std::string_view kInterrupted = "Control-C send";
+constexpr std::string_view kTerminationRequest = "Termination request";
+
 /// Handlers run here, so that a stack overflow can still be reported.
 alignas(16) std::array<char, 65536> handlerStack;
 
@@ -59,12 +62,12 @@ std::string_view messageOf(int signalNumber) noexcept {
     case SIGILL:
       return "Illegal instruction";
     case SIGINT:
-      return "Control-C send";
+      return kInterrupted;
     case SIGSEGV:
     case SIGBUS:
       return "Illegal storage access";
     default:
-      return "Termination request";
+      return kTerminationRequest;
   }
 }
 
@@ -160,6 +163,10 @@ int floatingPointSubCode(int signalCode) noexcept {
     default:
       return fpe::kOther;
   }
+}
+
+bool isEndingRequest(std::string_view message) noexcept {
+  return message == kInterrupted || message == kTerminationRequest;
 }
 
 std::string_view floatingPointMessage(int subCode) noexcept {

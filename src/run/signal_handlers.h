@@ -11,6 +11,9 @@ namespace mirevo {
 /// storage access.
 void installSignalHandlers();
 
+/// Whether a run that left this message was asked by a signal to end, rather than crashed.
+bool isEndingRequest(std::string_view message) noexcept;
+
 /// While one exists the requests to end the run wait, so that no file is left in the middle of a step. For the main
 /// thread; they may be nested.
 class EndingSignalsHeld final {

@@ -102,6 +102,7 @@ TEST(Report, OfARunThatGoesOnOrWasCutOffSaysSoAndLeavesItsFilesAlone) {
                                            MIREVO_TEST_MODEL));
   folder.writeSetup({.option = 0, .scenarios = {"1, 1, 1", "2, 2, 1"}});
   EXPECT_THAT(makeReport(folder).error, HasSubstr("basin.dat: No such file or directory"));
+  folder.write("basin_Report.html", "of an earlier run");
   {
     RunningProgram run({folder / "basin.kdx"});
     ASSERT_TRUE(waitUntil([&] { return folder.read("basin.dat").find("\n1\tOK\t") != std::string::npos; }));
@@ -115,11 +116,20 @@ TEST(Report, OfARunThatGoesOnOrWasCutOffSaysSoAndLeavesItsFilesAlone) {
     EXPECT_THAT(folder.read("basin.log"), StartsWith(log));
     EXPECT_FALSE(folder.exists("basin.1.log"));
   }  // killed
-  folder.write("basin.dat", folder.read("basin.dat") + "2\tOK\t0.");
+  EXPECT_EQ(folder.read("basin_Report.1.html"), "of an earlier run");
+  const std::string results = folder.read("basin.dat");
+  folder.write("basin.dat", results + "2\tOK\t0.");
   EXPECT_EQ(makeReport(folder).exitCode, 0);
   EXPECT_THAT(reportData(folder),
               AllOf(HasSubstr(R"("state":"cut off")"), HasSubstr("1 line of the result file is cut off"),
                     HasSubstr(R"("evaluations":1,)")));
+  for (const auto& [ending, state] : {std::pair{"Termination request", "cut off"},
+                                      {"Control-C send", "cut off"},
+                                      {"Illegal storage access", "failed"}}) {
+    folder.write("basin.dat", fmt::format("{}\n# {}\n", results, ending));
+    EXPECT_EQ(makeReport(folder).exitCode, 0);
+    EXPECT_THAT(reportData(folder), HasSubstr(fmt::format(R"("state":"{}","message":"{}")", state, ending)));
+  }
 }
 
 TEST(Report, IsLeftOutWhereTheSetupSaysSoAndNeverFailsTheRun) {
@@ -134,7 +144,7 @@ TEST(Report, IsLeftOutWhereTheSetupSaysSoAndNeverFailsTheRun) {
   EXPECT_EQ(makeReport(folder, "silent.kdx").exitCode, 0);
   EXPECT_TRUE(folder.exists("silent_Report.html"));
 
-  std::filesystem::create_directories(folder / "basin_Report.html/in the way");
+  std::filesystem::create_directories(folder / "basin_Report.html.tmp/in the way");
   EXPECT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0);
   EXPECT_THAT(folder.read("basin.log"), AllOf(HasSubstr("Warning: The report cannot be written: Is a directory"),
                                               EndsWith("Normal termination\n")));

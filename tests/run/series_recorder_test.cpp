@@ -92,8 +92,10 @@ TEST_F(SeriesRecorderTest, FollowsTheSearchAndAggregatesThatComeLater) {
   SeriesRecorder run = recorder();
   evaluate(run, 1, std::nan(""), true);
   evaluate(run, 2, std::nan(""));
+  run.aggregateSettled(1, 0.7);
   run.finish(BestEvaluation{2, 0.5, {2.0}});  // settled: the second is the best
   EXPECT_EQ(numbers(), "1 2");
+  EXPECT_EQ(table().initial->aggregate, 0.7);
   EXPECT_EQ(table().best->aggregate, 0.5);
   best_ = BestEvaluation{7, 0.5, {2.0}};  // the search took an equal one
   run.finish(best_);

@@ -218,7 +218,7 @@ export function axis(look: Look, plan: AxisPlan): object {
 
 export function legend(look: Look, more: object = {}): object {
   return {
-    top: 0, left: 'center', type: 'scroll', itemWidth: 22, itemHeight: 10,
+    top: 0, left: 'center', type: 'scroll', itemWidth: 22, itemHeight: 14,
     textStyle: { color: look.ink, width: 220, overflow: 'truncate' }, inactiveColor: look.faded,
     pageTextStyle: { color: look.muted }, pageIconColor: look.ink, pageIconInactiveColor: look.rule, ...more,
   };

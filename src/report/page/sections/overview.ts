@@ -43,7 +43,8 @@ function findings(data: ReportData): Finding[] {
   for (const series of data.series.slice(0, 3)) {
     const figures = series.figures?.best;
     if (!figures) continue;
-    const text = `${named(series.measure)} in the evaluation period: NSE ${number(figures.nse, 3)}, KGE ${number(figures.kge, 3)}, bias ${number(figures.pbias, 3)} %.`;
+    const of = series.bestNumber != null && series.bestNumber !== data.best?.number ? `, evaluation ${count(series.bestNumber)}` : '';
+    const text = `${named(series.measure)} in the evaluation period${of}: NSE ${number(figures.nse, 3)}, KGE ${number(figures.kge, 3)}, bias ${number(figures.pbias, 3)} %.`;
     found.push({ kind: 'plain', text });
   }
   for (const band of data.band.slice(0, 3)) {
@@ -76,7 +77,10 @@ export function head(data: ReportData): HTMLElement {
   const { run, best } = data;
   const state = kStates[run.state] ?? kStates.failed;
   const took = duration(run.started, run.ended);
-  const figures = data.series[0]?.figures?.best;
+  const shown = data.series[0];
+  const figures = shown?.figures?.best;
+  const isOlder = shown?.bestNumber != null && best !== null && shown.bestNumber !== best.number;
+  const of = shown && (isOlder ? `evaluation ${count(shown.bestNumber!)}` : shorten(shown.measure, 28));
   return make('div', { class: 'head', id: 'top' },
     make('p', { class: 'kicker' }, run.taskName),
     make('h1', {}, run.title || run.setupName || run.setup),
@@ -85,8 +89,8 @@ export function head(data: ReportData): HTMLElement {
       tile('Evaluations', count(run.evaluations), run.planned === null ? null : `of ${count(run.planned)} planned`),
       tile('Failed', count(run.failed), run.evaluations > 0 && run.failed > 0 ? percent(run.failed / run.evaluations, 2) : null),
       best ? tile('Best aggregate', number(best.aggregate), `evaluation ${count(best.number)}`) : '',
-      figures ? tile('NSE', number(figures.nse, 3), shorten(data.series[0]!.measure, 28)) : '',
-      figures ? tile('KGE', number(figures.kge, 3), shorten(data.series[0]!.measure, 28)) : '',
+      figures ? tile('NSE', number(figures.nse, 3), of) : '',
+      figures ? tile('KGE', number(figures.kge, 3), of) : '',
       took ? tile('Took', took) : ''),
     make('ul', { class: 'findings' }, ...findings(data).map((finding) => make('li', { class: finding.kind }, finding.text))));
 }

@@ -128,6 +128,12 @@ export function dottySection(data: ReportData, title: string): Section | null {
   };
 }
 
+// Of few evaluations more than a tenth are taken.
+function nameOfGood(data: ReportData, good: number[]): string {
+  const isShare = finite(data.evaluations.aggregate).length * kGoodShare > good.length - 1;
+  return isShare ? `best tenth (${count(good.length)} sets)` : `${count(good.length)} best sets`;
+}
+
 function parallelPlan(data: ReportData, good: number[]): ChartPlan {
   const variable = variableParameters(data);
   const { aggregate, parameters, numbers } = data.evaluations;
@@ -136,7 +142,7 @@ function parallelPlan(data: ReportData, good: number[]): ChartPlan {
     value: [...variable.map((_, index) => parameters[index]?.[place] ?? NaN), aggregate[place]!], name: numbers[place],
   }));
   return {
-    title: `Parallel coordinates of the best tenth (${count(good.length)} sets)`,
+    title: `Parallel coordinates of the ${nameOfGood(data, good)}`,
     note: `Each line is a parameter set, the colour its aggregate; the thick line is the best. Drag along an axis to pick lines.${
       good.length > drawn.length ? ` ${count(drawn.length)} of ${count(good.length)} lines are drawn.` : ''}`,
     height: 400,
@@ -176,7 +182,7 @@ function correlationPlan(data: ReportData, good: number[]): ChartPlan {
   const { parameters } = data.evaluations;
   const matrix = names.map((_, row) => names.map((__, column) =>
     (row === column ? 1 : correlation(parameters[row] ?? [], parameters[column] ?? [], good))));
-  return heatmap(`Correlation of the parameters among the best tenth (${count(good.length)} sets)`, names, names, matrix, 1,
+  return heatmap(`Correlation of the parameters among the ${nameOfGood(data, good)}`, names, names, matrix, 1,
     'Values near \u00b11 say that two parameters make up for each other.');
 }
 
@@ -238,7 +244,7 @@ export function goodSetsSection(data: ReportData): Section | null {
   if (good.length < 3 || variableParameters(data).length < 2) return null;
   return {
     id: 'good-sets',
-    title: 'The best tenth',
+    title: 'The best sets',
     content: [chart(parallelPlan(data, good)), chart(correlationPlan(data, good))],
   };
 }
