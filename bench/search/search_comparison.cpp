@@ -172,8 +172,8 @@ void printSurrogate() {
              kSurrogateTrials);
   fmt::print("| function | search | alone | quadratic 50 % | quadratic 25 % | Gaussian 50 % | Gaussian 25 % |\n");
   fmt::print("|---|---|---|---|---|---|---|\n");
-  for (const std::string name :
-       {"Goldstein-Price 2-D", "Rosenbrock 2-D", "Six-hump camel-back 2-D", "Shekel 4-D", "Hartman 6-D"}) {
+  for (const std::string name : {"Goldstein-Price 2-D", "Rosenbrock 2-D", "Six-hump camel-back 2-D", "Rastrigin 2-D",
+                                 "Griewank 2-D", "Shekel 4-D", "Hartman 6-D"}) {
     const TestFunction function = testing::testFunction(name);
     for (const Method method : {Method::sce, Method::pse}) {
       fmt::print("| {} | {} |", name, method == Method::sce ? "SCE" : "PSE");

@@ -98,6 +98,11 @@ std::vector<std::size_t> PopulationSearch::mostPromising(std::span<const Paramet
   return places;
 }
 
+std::optional<ParameterSet> PopulationSearch::predictedMinimum(const Individual& centre) {
+  if (!isSelecting()) return std::nullopt;
+  return problem_.selector->minimiser(centre.set);
+}
+
 bool PopulationSearch::isWithinBounds(const ParameterSet& set) const {
   for (std::size_t j = 0; j < set.size(); ++j) {
     if (!(set[j] >= problem_.bounds.lower[j] && set[j] <= problem_.bounds.upper[j])) return false;

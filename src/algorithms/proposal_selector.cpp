@@ -1,14 +1,20 @@
 #include "algorithms/proposal_selector.h"
 
 #include <algorithm>
+#include <cmath>
 #include <numeric>
 #include <utility>
 
 #include "algorithms/gaussian_process.h"
+#include "algorithms/pattern_search.h"
 #include "algorithms/quadratic_surrogate.h"
 
 namespace mirevo {
 namespace {
+
+/// Of the width of a neighbourhood: places no farther apart in any coordinate are the same, and a second run tells
+/// nothing.
+constexpr double kSamePlace = 1.0e-3;
 
 std::unique_ptr<SurrogateModel> makeModel(int type) {
   if (type == 1) return std::make_unique<GaussianProcess>();
@@ -66,6 +72,16 @@ std::vector<std::size_t> ProposalSelector::nearest(const std::vector<double>& po
   return places;
 }
 
+bool ProposalSelector::fitTo(std::span<const std::size_t> places) {
+  std::vector<std::vector<double>> points;
+  std::vector<double> values;
+  for (const std::size_t place : places) {
+    points.push_back(points_[place]);
+    values.push_back(values_[place]);
+  }
+  return model_->fit(points, values);
+}
+
 std::vector<double> ProposalSelector::predict(std::span<const ParameterSet> proposals) {
   std::vector<double> predictions;
   std::vector<std::size_t> fitted;  // the points that the model is fitted to
@@ -73,18 +89,40 @@ std::vector<double> ProposalSelector::predict(std::span<const ParameterSet> prop
     const std::vector<double> point = scaled(proposal);
     std::vector<std::size_t> neighbours = nearest(point);
     if (neighbours != fitted) {
-      std::vector<std::vector<double>> points;
-      std::vector<double> values;
-      for (const std::size_t place : neighbours) {
-        points.push_back(points_[place]);
-        values.push_back(values_[place]);
-      }
-      if (!model_->fit(points, values)) return {};
+      if (!fitTo(neighbours)) return {};
       fitted = std::move(neighbours);
     }
     predictions.push_back(model_->predict(point));
   }
   return predictions;
+}
+
+std::optional<ParameterSet> ProposalSelector::minimiser(const ParameterSet& centre) {
+  const std::vector<double> start = scaled(centre);
+  const std::vector<std::size_t> neighbours = nearest(start);
+  if (!fitTo(neighbours)) return std::nullopt;
+  Box box{start, start};
+  for (const std::size_t place : neighbours) {
+    for (std::size_t j = 0; j < start.size(); ++j) {
+      box.lower[j] = std::min(box.lower[j], points_[place][j]);
+      box.upper[j] = std::max(box.upper[j], points_[place][j]);
+    }
+  }
+  const auto predicted = [&](const std::vector<double>& point) { return model_->predict(point); };
+  const std::vector<double> found = patternSearch(predicted, start, box);
+  const auto isFound = [&](std::size_t place) {
+    for (std::size_t j = 0; j < found.size(); ++j) {
+      if (std::abs(found[j] - points_[place][j]) > kSamePlace * (box.upper[j] - box.lower[j])) return false;
+    }
+    return true;
+  };
+  if (std::any_of(neighbours.begin(), neighbours.end(), isFound)) return std::nullopt;
+  ParameterSet set(found.size());
+  for (std::size_t j = 0; j < set.size(); ++j) {
+    const double value = bounds_.lower[j] + found[j] * (bounds_.upper[j] - bounds_.lower[j]);
+    set[j] = std::clamp(value, bounds_.lower[j], bounds_.upper[j]);
+  }
+  return set;
 }
 
 std::vector<std::size_t> ProposalSelector::select(std::span<const ParameterSet> proposals, std::size_t count) {

@@ -2,6 +2,7 @@
 
 #include <cstddef>
 #include <memory>
+#include <optional>
 #include <span>
 #include <vector>
 
@@ -31,8 +32,15 @@ class ProposalSelector final {
   /// the first `count`.
   std::vector<std::size_t> select(std::span<const ParameterSet> proposals, std::size_t count);
 
+  /// Where the model fitted around `centre` predicts least within the box of the points that it is fitted to, as in a
+  /// step of a trust region. Nothing where no model can be fitted, nor where a point as good as there has been
+  /// evaluated.
+  std::optional<ParameterSet> minimiser(const ParameterSet& centre);
+
  private:
   std::vector<double> scaled(const ParameterSet& set) const;
+  /// Fits the model to the points at `places`; false when it cannot be fitted.
+  bool fitTo(std::span<const std::size_t> places);
   /// Predictions, one a proposal; empty when no model can be fitted.
   std::vector<double> predict(std::span<const ParameterSet> proposals);
   /// Places in the archive of the points nearest to `point`, in ascending order.

@@ -33,20 +33,24 @@ bool Pse::areSettingsValid() const {
 void Pse::makeLoop() {
   // Worst first: what a budget cuts off a generation are the proposals for its best points.
   std::vector<Offspring> offspring;
+  for (std::size_t place = population_.size(); place-- > 0;) offspring.push_back(mostPromisingOffspring(place));
+  if (std::optional<ParameterSet> minimum = predictedMinimum(population_.front())) {
+    offspring.front() = {std::move(*minimum), population_.size() - 1, false};
+  }
   std::vector<ParameterSet> proposals;
-  for (std::size_t place = population_.size(); place-- > 0;) {
-    for (std::size_t i = 0; i < proposalsPerRun(); ++i) {
-      offspring.push_back(makeOffspring(place));
-      proposals.push_back(offspring.back().set);
-    }
-  }
-  const std::vector<std::size_t> chosen = mostPromising(proposals, population_.size());
-  for (std::size_t i = 0; i < chosen.size(); ++i) {
-    offspring[i] = offspring[chosen[i]];
-    proposals[i] = offspring[i].set;
-  }
-  proposals.resize(chosen.size());
+  for (const Offspring& child : offspring) proposals.push_back(child.set);
   replaceParents(offspring, proposals);
+}
+
+/// Each point's own offspring compete, not those of the whole population: the promising ones of all lie close together.
+Pse::Offspring Pse::mostPromisingOffspring(std::size_t parent) {
+  std::vector<Offspring> drawn;
+  std::vector<ParameterSet> proposals;
+  for (std::size_t i = 0; i < proposalsPerRun(); ++i) {
+    drawn.push_back(makeOffspring(parent));
+    proposals.push_back(drawn.back().set);
+  }
+  return std::move(drawn[mostPromising(proposals, 1).front()]);
 }
 
 void Pse::replaceParents(std::span<const Offspring> offspring, std::span<const ParameterSet> proposals) {

@@ -18,8 +18,10 @@ namespace mirevo {
 ///   else a mutation, a random point of the simplex's box widened by a twentieth of its width on either side, always
 ///   taken but for the best point, which it takes the place of only when better: it keeps the population from
 ///   collapsing too soon.
-/// Coordinates outside the bounds are reflected at them. a and c are those of SCE. The best point never worsens. What
-/// the alternatives cost is measured in docs/algorithms/pse.md.
+/// Coordinates outside the bounds are reflected at them. a and c are those of SCE. The best point never worsens.
+/// With a surrogate model the most promising of several offspring of every point is run; where the model fitted around
+/// the best point predicts least is run in place of the worst point's. What the alternatives cost is measured in
+/// docs/algorithms/pse.md and docs/algorithms/surrogate.md.
 class Pse final : public PopulationSearch {
  public:
   Pse(const PseSettings& settings, const SimplexSettings& simplex, SearchProblem problem);
@@ -37,6 +39,7 @@ class Pse final : public PopulationSearch {
 
   std::vector<std::size_t> drawOthers(std::size_t parent);
   Offspring makeOffspring(std::size_t parent);
+  Offspring mostPromisingOffspring(std::size_t parent);
   void replaceParents(std::span<const Offspring> offspring, std::span<const ParameterSet> proposals);
 
   PseSettings settings_;

@@ -18,7 +18,11 @@ std::size_t Sce::populationSize() const {
 
 void Sce::makeLoop() {
   dealIntoComplexes();
-  for (int step = 0; step < settings_.evolutionSteps && !isBudgetUsedUp(); ++step) makeEvolutionStep();
+  for (int step = 0; step < settings_.evolutionSteps && !isBudgetUsedUp(); ++step) {
+    for (Complex& complex : complexes_) chooseSubcomplex(complex);
+    if (step == 0) proposePredictedMinimum(complexes_.front());
+    makeEvolutionStep();
+  }
   shuffle();
 }
 
@@ -39,7 +43,6 @@ void Sce::shuffle() {
 }
 
 void Sce::makeEvolutionStep() {
-  for (Complex& complex : complexes_) chooseSubcomplex(complex);
   tryProposals(&Sce::firstProposal, Acceptance::whenBetter);
   tryProposals(&Sce::secondProposal, Acceptance::whenBetter);
   tryProposals(&Sce::mutation, Acceptance::always);
@@ -69,6 +72,14 @@ void Sce::chooseSubcomplex(Complex& complex) {
   complex.current = std::move(drawn[chosen / 2]);
   complex.first = std::move(proposals[chosen]);
   complex.second = chosen % 2 == 0 ? contraction(complex) : std::move(proposals[chosen - 1]);
+}
+
+/// With a surrogate model the complex that holds the best point tries first where the model predicts least, and what it
+/// would have tried first comes second.
+void Sce::proposePredictedMinimum(Complex& complex) {
+  std::optional<ParameterSet> minimum = predictedMinimum(complex.points.front());
+  if (!minimum) return;
+  complex.second = std::exchange(complex.first, std::move(*minimum));
 }
 
 /// Evaluates one proposal of every complex that has not moved yet, in one batch.

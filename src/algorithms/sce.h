@@ -19,7 +19,8 @@ namespace mirevo {
 /// The paper has a = 1 and c = 1/2. Here a = 0.75 + 0.5/n (at most 1) and c = 0.45 − 0.1/n, which found the optima of
 /// the test functions as surely with about a seventh fewer evaluations (docs/algorithms/sce.md).
 /// With a surrogate model a complex looks at reflections and contractions of several subcomplexes, runs the most
-/// promising one first and its counterpart next, and of several random points runs the most promising.
+/// promising one first and its counterpart next, and of several random points runs the most promising. Once a loop the
+/// complex of the best point begins with the place where the model predicts least.
 /// As complexes are independent of each other between two shuffles they advance in step, and the batch of a step holds
 /// the current proposal of every complex. Points, values and random numbers do not depend on how the batch is run.
 class Sce final : public PopulationSearch {
@@ -54,6 +55,7 @@ class Sce final : public PopulationSearch {
 
   Subcomplex drawSubcomplex(const Complex& complex);
   void chooseSubcomplex(Complex& complex);
+  void proposePredictedMinimum(Complex& complex);
   void tryProposals(Proposal propose, Acceptance acceptance);
   ParameterSet firstProposal(const Complex& complex) { return complex.first; }
   ParameterSet secondProposal(const Complex& complex) { return complex.second; }

@@ -1,5 +1,6 @@
 #include "algorithms/optimisation_driver.h"
 
+#include <algorithm>
 #include <new>
 
 #include <gmock/gmock.h>
@@ -56,6 +57,22 @@ TEST(OptimisationDriver, EndsTheRunForAStatusOtherThanZeroInEitherStep) {
   EXPECT_EQ(messageOf({1, 0, 3}, "SCE"), "Error: Invalid operation in SCE algorithm");
   EXPECT_EQ(messageOf({0, -4, 3}, "PSE"), "Error: Invalid operation in PSE algorithm");
   EXPECT_EQ(messageOf({0, 0, -1}, "DDS"), "Error: Unable to allocate memory");
+}
+
+TEST(OptimisationDriver, WarnsOnceOfANegativeBestValueOfTheSample) {
+  for (const auto& [shift, warnings] : {std::pair{0.0, 0}, {-2.0, 1}}) {
+    testing::FunctionEvaluator evaluator(
+        [offset = shift](const ParameterSet& x) { return testing::resultOf(x[0] * x[0] + offset); });
+    UniformGenerator random(1);
+    std::vector<std::string> lines;
+    runPopulationSearch({}, {{{-1}, {1}, {0.7}}, {400, 1000, 0.0}, {}, {}, evaluator, random},
+                        [&](std::string_view line) { lines.emplace_back(line); });
+    EXPECT_EQ(std::count_if(lines.begin(), lines.end(),
+                            [](const std::string& line) {
+                              return line.starts_with("Warning: The best objective value is negative.");
+                            }),
+              warnings);
+  }
 }
 
 TEST(OptimisationDriver, SendsWhatTheSurrogateModelChoseInItsOwnMode) {

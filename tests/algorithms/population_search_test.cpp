@@ -124,17 +124,38 @@ TEST_P(EitherSearch, NeitherFixedParametersNorFailuresStallItOrMakeANotANumber) 
          if (x[2] < 0.5) result.failure.emplace();
          return result;
        }},
+      {"all of it failing",
+       [](const ParameterSet&) {
+         EvaluationResult result = resultOf(kFailedRunValue);
+         result.failure.emplace();
+         return result;
+       }},
+      {"steps, as of integer parameters",
+       [](const ParameterSet& x) { return resultOf(std::abs(std::floor(4 * x[0])) + std::abs(std::floor(4 * x[2]))); }},
   };
   for (const auto& [name, function] : functions) {
-    FunctionEvaluator evaluator(function);
-    UniformGenerator random(6);
-    const SearchBounds bounds{{-1, 0.1, -1}, {1, 0.1, 1}, {0.9, 0.1, 0.9}};
-    const auto search = makeSearch(GetParam(), 2, {bounds, {1500, 1000000, 0.0}, {}, {}, evaluator, random});
-    const SearchSummary summary = runToEnd(*search);
-    EXPECT_TRUE(std::isfinite(summary.populationRange)) << name;
-    EXPECT_TRUE(std::isfinite(summary.populationSpread)) << name;
-    for (const auto& batch : evaluator.batches) {
-      for (const ParameterSet& set : batch) ASSERT_EQ(set[1], 0.1) << name;
+    for (const int modelType : {-1, 0, 1}) {  // without, and with a surrogate model
+      FunctionEvaluator evaluator(function);
+      UniformGenerator random(6);
+      const SearchBounds bounds{{-1, 0.1, -1}, {1, 0.1, 1}, {0.9, 0.1, 0.9}};
+      ProposalSelector selector({50, 20, modelType, 1}, bounds);
+      const int budget = modelType == 1 ? 200 : 1500;
+      const auto search =
+          makeSearch(GetParam(), 2,
+                     {bounds, {budget, 1000000, 0.0}, {}, {}, evaluator, random, modelType < 0 ? nullptr : &selector});
+      const SearchSummary summary = runToEnd(*search);
+      EXPECT_LE(summary.evaluationCount, budget) << name;
+      EXPECT_TRUE(std::isfinite(summary.populationRange)) << name;
+      EXPECT_TRUE(std::isfinite(summary.populationSpread)) << name;
+      for (const auto& batch : evaluator.batches) {
+        for (const ParameterSet& set : batch) {
+          ASSERT_EQ(set[1], 0.1) << name;
+          ASSERT_TRUE(std::abs(set[0]) <= 1.0 && std::abs(set[2]) <= 1.0) << name;
+        }
+      }
+      if (name == "steps, as of integer parameters") {
+        EXPECT_EQ(summary.bestResult.aggregate, 0.0) << modelType;
+      }
     }
   }
 }

@@ -206,6 +206,41 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotRead) {
   for (const auto& row : cases) EXPECT_THAT(logOf({row.edit}), HasSubstr(row.warning)) << row.edit.to;
 }
 
+TEST_F(SetupReaderTest, WarnsOfSearchSettingsThatEndASearchEarly) {
+  const Edit sce{"Algorithm_Type = 1", "Algorithm_Type = 0"};
+  const Edit dds{"Algorithm_Type = 1", "Algorithm_Type = 2"};
+  const struct {
+    std::vector<Edit> edits;
+    const char* warning;  ///< empty: none of these
+  } cases[] = {
+      {{}, ""},  // two variable parameters, 20 = 4(2n + 1) points
+      {{{"Population_Size = 20", "Population_Size = 19"}, {"Neighbourhood_Size = 60", "Neighbourhood_Size = 50"}},
+       "Population_Size: found 19, at least 20 are advised for the number of variable parameters"},
+      {{{"No_Points_Simplex = 5", "No_Points_Simplex = 2"}}, "No_Points_Simplex: found 2, at least 3 are advised"},
+      {{sce}, ""},
+      {{sce,
+        {"No_Points_Complex = 7", "No_Points_Complex = 4"},
+        {"No_Points_Subcomplex = 6", "No_Points_Subcomplex = 2"}},
+       "No_Points_Complex: found 4, at least 5 are advised"},
+      {{sce, {"No_Points_Subcomplex = 6", "No_Points_Subcomplex = 2"}},
+       "No_Points_Subcomplex: found 2, at least 3 are advised"},
+      {{{"Max_No_Evaluations = 500", "Max_No_Evaluations = 19"}},
+       "Max_No_Evaluations: the initial sample of 20 sets is cut to 19, and no search follows"},
+      {{{"Max_No_Evaluations = 500", "Max_No_Evaluations = 20"}}, ""},
+      {{sce, {"Max_No_Evaluations = 500", "Max_No_Evaluations = 27"}},
+       "Max_No_Evaluations: the initial sample of 28 sets is cut to 27"},
+      {{dds, {"Max_No_Evaluations = 500", "Max_No_Evaluations = 10"}}, ""},
+  };
+  for (const auto& row : cases) {
+    const std::string log = logOf(row.edits);
+    if (*row.warning != '\0') {
+      EXPECT_THAT(log, HasSubstr(row.warning));
+    } else {
+      EXPECT_THAT(log, testing::AllOf(testing::Not(HasSubstr("advised")), testing::Not(HasSubstr("is cut to"))));
+    }
+  }
+}
+
 TEST_F(SetupReaderTest, TheSetupIsLookedForWhereItsNameSays) {
   RunLog log;
   try {
