@@ -162,8 +162,10 @@ void ProgressReporter::progressStep() {
   isCancelled();
 }
 
-void ProgressReporter::progressReplayed() {
+void ProgressReporter::progressReplayed(int number, bool ok) {
   ++completedEvaluations_;
+  writeMessage(withNumber("Evaluation of parameter set No. % taken from the earlier run: ", number) +
+               (ok ? "OK" : "FAILED"));
   times_.assign(1, clock_());
 }
 
