@@ -55,6 +55,7 @@ class ProgressReporter final {
   bool isCancelled();
 
  private:
+  void writePercentage();
   void writeRecord(std::string_view kind, std::string_view text);
   /// False, with errno set, when what was written may not be in the file.
   bool closeMessageFile();
