@@ -155,15 +155,21 @@ void ProgressReporter::progressStep() {
     writeSpeed(fmt::format("{:.6g}", perSecond));
     writeTimeLeft(fmt::format("{:.0f}", left / perSecond));
   }
-  if (plannedEvaluations_ > 0) {
-    const double percent = std::min(100.0, 100.0 * completedEvaluations_ / plannedEvaluations_);
-    writeProgress(fmt::format("{:.1f}", percent));
-  }
+  writePercentage();
   isCancelled();
 }
 
-void ProgressReporter::progressReplayed() {
+void ProgressReporter::writePercentage() {
+  if (plannedEvaluations_ <= 0) return;
+  const double percent = std::min(100.0, 100.0 * completedEvaluations_ / plannedEvaluations_);
+  writeProgress(fmt::format("{:.1f}", percent));
+}
+
+void ProgressReporter::progressReplayed(int number, bool ok) {
   ++completedEvaluations_;
+  writeMessage(withNumber("Evaluation of parameter set No. % taken from the earlier run: ", number) +
+               (ok ? "OK" : "FAILED"));
+  writePercentage();  // the next evaluation may take hours
   times_.assign(1, clock_());
 }
 

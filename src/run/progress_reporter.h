@@ -40,7 +40,7 @@ class ProgressReporter final {
   /// After each completed evaluation: speed, time left and percentage; then looks for the kill file.
   void progressStep();
   /// After an evaluation whose result was taken from an earlier run: it is counted, but says nothing of the speed.
-  void progressReplayed();
+  void progressReplayed(int number, bool ok);
   /// A new best evaluation: its number, aggregate, and when it was found, as dateAndTimeWithZone() says it; empty for
   /// one of an earlier run.
   void progressBest(int number, double aggregate, std::string_view foundAt);
@@ -55,6 +55,7 @@ class ProgressReporter final {
   bool isCancelled();
 
  private:
+  void writePercentage();
   void writeRecord(std::string_view kind, std::string_view text);
   /// False, with errno set, when what was written may not be in the file.
   bool closeMessageFile();

@@ -90,6 +90,9 @@ void RunDriver::openRun(const std::string& setupFileName) {
   if (const std::string fault = faultOfFile(setup.file);
       !fault.empty() && std::filesystem::exists(setup.file, ignored)) {
     fatalError("Error: Unable to open " + setup.file, fault);  // before files are made beside it: it may be in /dev
+  } else if (const std::string meant = setup.file + ".kdx"; !fault.empty() && faultOfFile(meant).empty()) {
+    // They would be those of that setup, of which a run may be going on.
+    fatalError("Error: Unable to open " + setup.file, fmt::format("{}; did you mean {}?", fault, meant));
   }
   if (!lock_.take(setup.file, kPatienceSeconds)) {
     fatalError("Error: Another run of this setup is in progress",

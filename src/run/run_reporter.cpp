@@ -40,10 +40,10 @@ void RunReporter::evaluationFinished(std::span<const double> set, const Evaluati
 
 void RunReporter::evaluationReplayed(std::span<const double> set, const EvaluationResult& result) {
   ++replayedCount_;
+  state_.progress.progressReplayed(result.number, result.ok());
   const std::vector<double> values = ToModelScale(space_, set);
   count(values, result, {});
   if (!result.shownSeries.empty()) recordSeries(set, values, result);
-  state_.progress.progressReplayed();
 }
 
 void RunReporter::count(const std::vector<double>& parameterValues, const EvaluationResult& result,

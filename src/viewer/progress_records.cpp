@@ -154,7 +154,7 @@ void ProgressRecords::addNotice(std::string_view text) {
 bool ProgressRecords::takeEvaluationMessage(std::string_view text) {
   std::string_view rest = text;
   if (!takeText(rest, "Evaluation of parameter set No. ") || !takeCount(rest)) return false;
-  if (takeText(rest, " completed: ")) {
+  if (takeText(rest, " completed: ") || takeText(rest, " taken from the earlier run: ")) {
     ++state_.done;
     if (rest.starts_with("FAILED")) {
       ++state_.failed;

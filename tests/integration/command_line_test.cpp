@@ -45,6 +45,13 @@ TEST(CommandLine, AMissingSetupFileIsNamedOnStandardErrorAndInTheLog) {
       EXPECT_FALSE(folder.exists(name + std::string(ending)));
   }
 
+  // Nor over the files of the setup that was meant, of which a run may be going on.
+  folder.write("meant.kdx", "");
+  folder.write("meant.log", "of the run");
+  EXPECT_THAT(runProgram({(folder / "meant")}).error, HasSubstr("did you mean " + (folder / "meant.kdx") + "?"));
+  EXPECT_EQ(folder.read("meant.log"), "of the run");
+  EXPECT_FALSE(folder.exists("meant._spi_"));
+
   const ProgramResult nowhere = runProgram({(folder / "no/such/folder/basin.kdx")});
   EXPECT_EQ(nowhere.exitCode, 1);
   EXPECT_THAT(nowhere.error, HasSubstr((folder / "no/such/folder/basin")));

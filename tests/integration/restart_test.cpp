@@ -218,6 +218,8 @@ TEST_F(Restart, AFinishedRunIsWalkedThroughAndEndsWithTheSameFile) {
   run();
   EXPECT_EQ(results(), expected);
   EXPECT_THAT(log(), Not(HasSubstr("initiated")));
+  EXPECT_THAT(folder_.read("basin._spi_"), HasSubstr("MESSAGEvaluation of parameter set No. 20 taken from the earlier "
+                                                     "run: OK\nPROGRE100.0\n"));
   EXPECT_FALSE(folder_.exists("basin.1.dat"));
   EXPECT_FALSE(folder_.exists("basin_Band_1.1.csv"));
   edit("Restart = 1", "Restart = 0");
