@@ -12,6 +12,7 @@
 #include "platform/front_end.h"
 #include "platform/mpi_session.h"
 #include "run/run_driver.h"
+#include "run/signal_handlers.h"
 #include "run/stop_run.h"
 #include "run/version.h"
 #include "viewer/qmon_start.h"
@@ -67,7 +68,11 @@ void processStart(int argc, char** argv) {
   // A job launcher watches over its processes, which must stay those that it started.
   const bool isPartOfJob = launcherRank() >= 0;
   if (setupFileName.empty() || isQuestion(setupFileName) || isPartOfJob) run();
-  qmonExit(qmonStart(setupFileName, run));
+  const auto prepare = [] {
+    ::setenv("G48", "QMON", 1);
+    installSignalHandlers();
+  };
+  qmonExit(qmonStart(setupFileName, prepare, run));
 }
 
 void runWithFrontEnd(std::string_view environmentSetting, const CommandLine& commandLine) {

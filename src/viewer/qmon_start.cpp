@@ -28,11 +28,10 @@ void dropPending(int signalNumber) {
 }
 
 /// The run's side: away from the terminal, what it prints into the pipe, its records into the message file.
-void becomeRun(int output, const sigset_t& blockedBefore) {
+void becomeRun(int output, const sigset_t& blockedBefore, const std::function<void()>& prepare) {
   ::setsid();
   // What the terminal sent to both while they were one is the viewer's.
   for (const int signalNumber : {SIGINT, SIGQUIT, SIGHUP}) dropPending(signalNumber);
-  ::sigprocmask(SIG_SETMASK, &blockedBefore, nullptr);
   ::signal(SIGPIPE, SIG_IGN);
   if (const int nothing = ::open("/dev/null", O_RDONLY | O_CLOEXEC); nothing >= 0) {
     ::dup2(nothing, STDIN_FILENO);
@@ -41,11 +40,13 @@ void becomeRun(int output, const sigset_t& blockedBefore) {
   ::dup2(output, STDOUT_FILENO);
   ::dup2(output, STDERR_FILENO);
   ::unsetenv("VOLK_PROGRESS");
+  prepare();
+  ::sigprocmask(SIG_SETMASK, &blockedBefore, nullptr);
 }
 
 }  // namespace
 
-int qmonStart(const std::string& setupFile, const std::function<void()>& run) {
+int qmonStart(const std::string& setupFile, const std::function<void()>& prepare, const std::function<void()>& run) {
   std::array<int, 2> pipe{-1, -1};
   // Whoever started the program may have it ignored, and the run's end would never be told.
   ::signal(SIGCHLD, SIG_DFL);
@@ -60,7 +61,7 @@ int qmonStart(const std::string& setupFile, const std::function<void()>& run) {
     showMessage(fmt::format("Unable to start the progress viewer: {}", std::strerror(errno)), {}, MessageType::warning);
     ::sigprocmask(SIG_SETMASK, &blockedBefore, nullptr);
   }
-  if (process == 0) becomeRun(pipe[1], blockedBefore);
+  if (process == 0) becomeRun(pipe[1], blockedBefore, prepare);
   for (const int end : pipe) {
     if (end >= 0) ::close(end);
   }
