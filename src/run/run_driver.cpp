@@ -192,8 +192,15 @@ void RunDriver::openSeries() {
   run.periodLast = secondNumber(config_.period.end);
   series_ = std::make_unique<SeriesRecorder>(path, std::move(run), runTimeClock,
                                              [this](std::string_view text) { state_.log.warning(text); });
-  std::string reason;
-  if (goesOn) series_->resume(readTextFile(path, reason).value_or(std::string{}));
+  if (goesOn) {
+    std::string reason;
+    const auto earlier = readTextFile(path, reason);
+    std::error_code ignored;
+    if (!earlier && std::filesystem::exists(path, ignored)) {
+      state_.log.warning(fmt::format("The series of the earlier run are not taken up: {}: {}", path, reason));
+    }
+    series_->resume(earlier.value_or(std::string{}));
+  }
   reporter_->recordSeries(*series_);
 }
 

@@ -350,8 +350,9 @@ void ReportBuilder::addFailures() {
   std::string reason;
   const auto text = readTextFile(path, reason);
   if (text) data_.failures = readFailureReasons(*text, config_.setupName);
-  if (data_.failures.empty())
-    note("Why evaluations failed is not shown: calSimErr.dat is not there or of another run.");
+  if (!data_.failures.empty()) return;
+  note(fmt::format("Why evaluations failed is not shown: calSimErr.dat: {}.",
+                   text ? "it holds no failures of this run" : reason));
 }
 
 void ReportBuilder::addSeries() {
@@ -402,7 +403,10 @@ bool writeReport(const RunConfig& config, const std::string& filePrefix, const s
                  std::string& reason) noexcept {
   try {
     const std::optional<ReportData> data = buildReport(config, filePrefix, ending, reason);
-    return data && writeWhole(reportPath(filePrefix), reportPage(reportPageTemplate(), *data), reason);
+    if (!data) return false;
+    const std::string path = reportPath(filePrefix);
+    if (writeWhole(path, reportPage(reportPageTemplate(), *data), reason)) return true;
+    reason = path + ": " + reason;
   } catch (const FatalError& error) {
     reason = error.message() + "\n" + error.detail();
   } catch (const std::exception& error) {

@@ -17,6 +17,7 @@ struct Expectation {
   bool mayPassSilently = false;         ///< a run that ends well need not mention it
   bool mayFailEvaluation = false;       ///< it makes a model run fail, and is told of where such are
   bool logMayLackMessage = false;       ///< the log is what fails, or is not open yet
+  bool mayBeToldInReport = false;       ///< what only the report lacks, the report says
   bool resultFileFails = false;         ///< rows that the log tells of may be missing from the result file
 };
 
