@@ -20,6 +20,7 @@ std::vector<std::string> FailureSummary::lines() const {
   std::stable_sort(ordered.begin(), ordered.end(),
                    [](const auto& a, const auto& b) { return a.second.count > b.second.count; });
   std::vector<std::string> lines;
+  lines.reserve(ordered.size());
   for (const auto& [kind, count] : ordered) {
     lines.push_back(fmt::format("   {} x {}; first No. {}: {}", count.count, failureKindName(kind), count.firstNumber,
                                 count.firstReason));
