@@ -38,6 +38,7 @@ void Pse::makeLoop() {
     offspring.front() = {std::move(*minimum), population_.size() - 1, false};
   }
   std::vector<ParameterSet> proposals;
+  proposals.reserve(offspring.size());
   for (const Offspring& child : offspring) proposals.push_back(child.set);
   replaceParents(offspring, proposals);
 }

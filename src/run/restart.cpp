@@ -123,6 +123,8 @@ std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunCon
                                          const ResultColumns& columns) {
   const auto text = readFileIfThere(files.results);
   ResultTable table = readResultTable(text.value_or(""));
+  // More than a beginning that was cut off: there may be days of work behind a header row that cannot be read.
+  if (!table.hasHeader() && table.unusableLines > 1) refuse(files.results + " has no header row that can be read");
   if (table.rows.empty()) return std::nullopt;
   const RestartSettings then = readSettings(files.settings);
   const RestartSettings now = restartSettings(config);
@@ -135,7 +137,7 @@ std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunCon
   putInOrder(run.rows);
   if (table.unusableLines > 0) {
     run.notes.push_back(
-        fmt::format("{} rows of {} were cut off or damaged and are made again", table.unusableLines, files.results));
+        fmt::format("Rows of {} that were cut off or damaged are made again: {}", files.results, table.unusableLines));
   }
   if (config.restart == kRepeatFailed) dropFailuresAtEnd(run);
   const auto earlierBudget = searchBudget(then);

@@ -158,11 +158,8 @@ void RunDriver::logSetup() {
 
 void RunDriver::openResults() {
   state_.objectiveValues.resize(config_.objectives.size());
-  // Were the run killed, the report of an earlier one would else pass for its own.
-  if (const std::string kept = keepEarlierFile(reportPath(filePrefix_)); !kept.empty()) {
-    state_.log.line("The report of the earlier run was kept as " + kept);
-  }
   results_->open(config_, runner_->observedSeries(), *aggregator_, state_.log);
+  putEarlierReportAside();
   signalState.resultFileDescriptor = results_->table().descriptor();
   reporter_ = std::make_unique<RunReporter>(state_, results_->table(), results_->failedRuns(),
                                             parameters_->searchSpace(), results_->simulatedValues());
@@ -174,6 +171,17 @@ void RunDriver::openResults() {
   } else {
     evaluator_ = std::make_unique<LocalEvaluator>(*runner_, *reporter_, *failedRunPolicy_,
                                                   config_.simultaneousSimulations, earlier);
+  }
+}
+
+/// Were the run killed, an earlier report would else pass for its own. One of the same run can be made anew at any
+/// time.
+void RunDriver::putEarlierReportAside() {
+  if (results_->earlierEvaluations() != nullptr) {
+    std::error_code ignored;
+    std::filesystem::remove(reportPath(filePrefix_), ignored);
+  } else if (const std::string kept = keepEarlierFile(reportPath(filePrefix_)); !kept.empty()) {
+    state_.log.line("The report of the earlier run was kept as " + kept);
   }
 }
 

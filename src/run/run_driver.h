@@ -40,6 +40,7 @@ class RunDriver final {
   void buildModel();
   void logSetup();
   void openResults();
+  void putEarlierReportAside();
   void openSeries();
   /// False, with the system's reason, when the results could not be brought to their end. `report`: what the task
   /// found.

@@ -164,17 +164,25 @@ TEST_F(EarlierRunTest, ARaisedBudgetOfDdsIsAnotherSearch) {
   }
 }
 
-TEST_F(EarlierRunTest, WithoutItsSettingsItIsRefused) {
+TEST_F(EarlierRunTest, WithoutItsSettingsOrItsHeaderItIsRefused) {
   const RunConfig config = read();
   const RestartFiles files = restartFiles(folder_ + "/setup_Optimisation.dat");
-  write("setup_Optimisation.dat", kHeader + row(1));
-  for (const bool isThere : {false, true}) {
-    if (isThere) write("setup_Optimisation_Restart.dat", "# nothing\n");
+  const std::string damaged = "Evalu\tStatus\n" + row(1) + row(2);
+  const struct {
+    std::string results;
+    const char* settings;  ///< no file when empty
+    const char* detail;
+  } cases[] = {{std::string(kHeader) + row(1), "", "setup_Optimisation_Restart.dat"},
+               {std::string(kHeader) + row(1), "# nothing\n", "setup_Optimisation_Restart.dat"},
+               {damaged, "", "setup_Optimisation.dat has no header row that can be read"}};
+  for (const auto& c : cases) {
+    write("setup_Optimisation.dat", c.results);
+    if (*c.settings != 0) write("setup_Optimisation_Restart.dat", c.settings);
     try {
       findEarlierRun(files, config, {});
       ADD_FAILURE() << "went on without knowing from what";
     } catch (const FatalError& error) {
-      EXPECT_THAT(withoutFolder(error.detail()), testing::StartsWith("setup_Optimisation_Restart.dat"));
+      EXPECT_THAT(withoutFolder(error.detail()), testing::StartsWith(c.detail));
     }
   }
 }
