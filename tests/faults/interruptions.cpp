@@ -39,7 +39,7 @@ void tryKills(int option, bool restarts, int count, FaultReport& report) {
   const std::string calls = records.read("calls");
   std::mt19937 generator(static_cast<unsigned>(option));
   const auto callCount = static_cast<unsigned long>(std::count(calls.begin(), calls.end(), '\n'));
-  for (int i = 0; i < count; ++i) {
+  for (int i = 0; i < count && callCount > 0; ++i) {
     const unsigned long moment = 1 + generator() % callCount;
     environment = injection(run);
     environment["FAULT_KILL"] = std::to_string(moment);
