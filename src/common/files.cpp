@@ -1,6 +1,7 @@
 #include "common/files.h"
 
 #include <cerrno>
+#include <cstdio>
 #include <cstring>
 #include <fcntl.h>
 #include <sys/stat.h>
@@ -17,6 +18,25 @@ namespace {
 std::string faultOfKind(const struct stat& status) {
   if (S_ISREG(status.st_mode)) return {};
   return S_ISDIR(status.st_mode) ? std::strerror(EISDIR) : "Not a regular file";
+}
+
+/// Removes `path` and creates it anew with `content`, and with `mode` or, without one, as the umask has it.
+bool createAnew(const std::string& path, std::string_view content, std::optional<unsigned> mode, bool isFlushed,
+                std::string& reason) {
+  if (::unlink(path.c_str()) != 0 && errno != ENOENT) {
+    reason = std::strerror(errno);
+    return false;
+  }
+  Descriptor file(::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, mode.value_or(0666) & 07777));
+  if (file.get() < 0 || (mode && ::fchmod(file.get(), *mode & 07777) != 0)) {
+    reason = std::strerror(errno);
+    return false;
+  }
+  int error = writeWhole(file.get(), content).error;
+  if (error == 0 && isFlushed && ::fsync(file.get()) != 0) error = errno;
+  if (error == 0 && !file.close()) error = errno;
+  if (error != 0) reason = std::strerror(error);
+  return error == 0;
 }
 
 }  // namespace
@@ -63,19 +83,21 @@ std::optional<std::string> readFileIfThere(const std::string& path) {
 }
 
 bool writeByUnlinkAndCreate(const std::string& path, std::string_view content, unsigned mode, std::string& reason) {
-  if (::unlink(path.c_str()) != 0 && errno != ENOENT) {
+  return createAnew(path, content, mode, false, reason);
+}
+
+bool replaceFile(const std::string& path, std::string_view content, std::string& reason) {
+  const std::string temporary = path + std::string(kTemporaryEnding);
+  struct stat status {};
+  std::optional<unsigned> mode;
+  if (::stat(path.c_str(), &status) == 0) mode = status.st_mode;
+  bool replaced = createAnew(temporary, content, mode, true, reason);
+  if (replaced && ::rename(temporary.c_str(), path.c_str()) != 0) {
     reason = std::strerror(errno);
-    return false;
+    replaced = false;
   }
-  Descriptor file(::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, mode & 07777));
-  if (file.get() < 0 || ::fchmod(file.get(), mode & 07777) != 0) {
-    reason = std::strerror(errno);
-    return false;
-  }
-  int error = writeWhole(file.get(), content).error;
-  if (error == 0 && !file.close()) error = errno;
-  if (error != 0) reason = std::strerror(error);
-  return error == 0;
+  if (!replaced) ::unlink(temporary.c_str());
+  return replaced;
 }
 
 }  // namespace mirevo

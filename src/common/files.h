@@ -23,4 +23,12 @@ std::optional<std::string> readFileIfThere(const std::string& path);
 /// when that fails.
 bool writeByUnlinkAndCreate(const std::string& path, std::string_view content, unsigned mode, std::string& reason);
 
+/// What follows a file's name while replaceFile() writes it.
+inline constexpr std::string_view kTemporaryEnding = ".tmp";
+
+/// Puts `content` in the place of a file, or makes it: written beside it, flushed to disk and renamed, so that at every
+/// moment either the old or the new one is there, whole. The old file's mode is kept. False, with the system's reason,
+/// when that fails; the old file is then untouched.
+bool replaceFile(const std::string& path, std::string_view content, std::string& reason);
+
 }  // namespace mirevo

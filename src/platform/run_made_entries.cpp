@@ -9,6 +9,7 @@
 #include <utility>
 
 #include "common/descriptor.h"
+#include "common/files.h"
 #include "common/text.h"
 #include "platform/process_folder.h"
 
@@ -18,7 +19,8 @@ namespace {
 constexpr std::string_view kSetupEnding = ".kdx";
 
 /// What follows a setup's name in the name of something that its runs make. What an earlier run made is kept with a
-/// number before the extension: `basin_Saved.2`, `basin_Optimisation.1.dat`.
+/// number before the extension: `basin_Saved.2`, `basin_Optimisation.1.dat`. A run that was killed may have left one
+/// half-written, with kTemporaryEnding behind it.
 struct Ending {
   std::string_view stem;
   std::string_view extension;
@@ -55,6 +57,7 @@ bool take(std::string_view& text, std::string_view front) {
 }
 
 bool matches(std::string_view text, const Ending& ending) {
+  if (text.ends_with(kTemporaryEnding)) text.remove_suffix(kTemporaryEnding.size());
   if (!take(text, ending.stem) || (ending.isNumbered && !takeNumber(text))) return false;
   if (text == ending.extension) return true;
   return take(text, ".") && takeNumber(text) && text == ending.extension;

@@ -1,12 +1,7 @@
 #include "report/report_file.h"
 
-#include <cerrno>
-#include <cstdio>
-#include <cstring>
-#include <sys/stat.h>
-#include <unistd.h>
+#include <algorithm>
 
-#include "common/files.h"
 #include "report/report_json.h"
 
 namespace mirevo {
@@ -53,20 +48,6 @@ std::string reportPage(std::string_view page, const ReportData& data) {
     page.remove_prefix(at + (at == titleAt ? kTitleMark : kDataMark).size());
   }
   return text;
-}
-
-bool writeWhole(const std::string& path, std::string_view text, std::string& reason) {
-  const std::string temporary = path + ".tmp";
-  const mode_t mask = ::umask(0);
-  ::umask(mask);
-  if (!writeByUnlinkAndCreate(temporary, text, 0666U & ~mask, reason)) {
-    ::unlink(temporary.c_str());
-    return false;
-  }
-  if (::rename(temporary.c_str(), path.c_str()) == 0) return true;
-  reason = std::strerror(errno);
-  ::unlink(temporary.c_str());
-  return false;
 }
 
 }  // namespace mirevo

@@ -10,21 +10,11 @@
 
 #include <fmt/format.h>
 
-#include "common/descriptor.h"
 #include "common/fatal_error.h"
-#include "common/files.h"
 #include "platform/file_copy.h"
 #include "run/signal_handlers.h"
 
 namespace mirevo {
-namespace {
-
-bool flushToDisk(const std::string& path) {
-  const Descriptor file(::open(path.c_str(), O_WRONLY | O_CLOEXEC));
-  return file.get() >= 0 && ::fsync(file.get()) == 0;
-}
-
-}  // namespace
 
 RecordFile::~RecordFile() {
   std::string reason;
@@ -94,19 +84,6 @@ bool RecordFile::tryClose(std::string& reason) {
   if (descriptor < 0 || ::close(descriptor) == 0 || errno == EINTR) return true;
   reason = std::strerror(errno);
   return false;
-}
-
-bool replaceFile(const std::string& path, std::string_view content, std::string& reason) {
-  const std::string temporary = path + ".tmp";
-  struct stat status {};
-  const unsigned mode = ::stat(path.c_str(), &status) == 0 ? status.st_mode : 0644;
-  bool replaced = writeByUnlinkAndCreate(temporary, content, mode, reason);
-  if (replaced) {
-    replaced = flushToDisk(temporary) && ::rename(temporary.c_str(), path.c_str()) == 0;
-    if (!replaced) reason = std::strerror(errno);
-  }
-  if (!replaced) ::unlink(temporary.c_str());
-  return replaced;
 }
 
 std::string keepEarlierFile(const std::string& path) {

@@ -48,11 +48,6 @@ class RecordFile final {
   bool failed_ = false;
 };
 
-/// Puts `content` in the place of a file, or makes it: written beside it, flushed to disk and renamed, so that at every
-/// moment either the old or the new one is there, whole. The old file's mode is kept. False, with the system's reason,
-/// when that fails; the old file is then untouched.
-bool replaceFile(const std::string& path, std::string_view content, std::string& reason);
-
 /// Keeps an earlier run's file or folder from being overwritten: renames `path` to the first free of
 /// `<stem>.1<ending>`, `<stem>.2<ending>` ... and returns that name; empty when there is nothing to keep, or something
 /// that is neither (a device). Throws FatalError when it cannot be looked at or renamed.

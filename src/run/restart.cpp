@@ -10,7 +10,6 @@
 #include "algorithms/dds.h"
 #include "common/fatal_error.h"
 #include "common/files.h"
-#include "run/record_file.h"
 #include "run/restart_settings.h"
 
 namespace mirevo {

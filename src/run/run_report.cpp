@@ -405,7 +405,7 @@ bool writeReport(const RunConfig& config, const std::string& filePrefix, const s
     const std::optional<ReportData> data = buildReport(config, filePrefix, ending, reason);
     if (!data) return false;
     const std::string path = reportPath(filePrefix);
-    if (writeWhole(path, reportPage(reportPageTemplate(), *data), reason)) return true;
+    if (replaceFile(path, reportPage(reportPageTemplate(), *data), reason)) return true;
     reason = path + ": " + reason;
   } catch (const FatalError& error) {
     reason = error.message() + "\n" + error.detail();

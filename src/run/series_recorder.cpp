@@ -7,7 +7,7 @@
 
 #include <fmt/format.h>
 
-#include "report/report_file.h"
+#include "common/files.h"
 
 namespace mirevo {
 namespace {
@@ -133,7 +133,7 @@ void SeriesRecorder::write() {
   if (best_) table.best = best_->evaluation;
   for (std::size_t i = 0; i < run_.measures.size(); ++i) table.series.push_back(shownSeries(i));
   std::string reason;
-  if (!writeWhole(path_, seriesTableText(table), reason)) warn(reason);
+  if (!replaceFile(path_, seriesTableText(table), reason)) warn(reason);
   isChanged_ = false;
   const double ended = clock_();
   nextWrite_ = ended + std::max(kLeastSecondsBetween, (ended - begun) / kShareOfWriting);

@@ -1,51 +1,75 @@
 #include "common/files.h"
 
-#include <filesystem>
-#include <fstream>
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include <gtest/gtest.h>
+
+#include "temporary_folder.h"
 
 namespace mirevo {
 namespace {
 
 class Files : public testing::Test {
  protected:
-  Files() : folder_(std::filesystem::temp_directory_path() / ("mirevo_files_" + std::to_string(::getpid()))) {
-    std::filesystem::create_directories(folder_);
+  unsigned modeOf(const char* name) const {
+    struct stat status {};
+    EXPECT_EQ(::stat((folder_ / name).c_str(), &status), 0);
+    return status.st_mode & 07777U;
   }
-  ~Files() override { std::filesystem::remove_all(folder_); }
-  std::string path(const char* name) const { return (folder_ / name).string(); }
 
-  std::filesystem::path folder_;
+  TemporaryFolder folder_;
   std::string reason_;
 };
 
-TEST_F(Files, ReplacesAFileByANewOneWithTheModeAskedFor) {
-  std::ofstream(path("a.txt")) << "an old and longer content";
-  ASSERT_EQ(::link(path("a.txt").c_str(), path("b.txt").c_str()), 0);
-  ASSERT_TRUE(writeByUnlinkAndCreate(path("a.txt"), "new", 0754, reason_)) << reason_;
-  EXPECT_EQ(readTextFile(path("a.txt"), reason_), "new");
-  EXPECT_EQ(readTextFile(path("b.txt"), reason_), "an old and longer content") << "the old file itself was written";
-  struct stat status {};
-  ASSERT_EQ(::stat(path("a.txt").c_str(), &status), 0);
-  EXPECT_EQ(status.st_mode & 07777U, 0754U);
+TEST_F(Files, AreReplacedByNewOnesWithTheModeAskedForOrTheirOwn) {
+  const struct {
+    unsigned mode;
+    bool isOwn;
+  } cases[] = {{0754, false}, {0640, true}, {0666, true}};
+  for (const auto& c : cases) {
+    const std::string path = folder_.write("a.txt", "an old and longer content", c.isOwn ? c.mode : 0600);
+    std::filesystem::create_hard_link(path, folder_ / "b.txt");
+    const bool isReplaced =
+        c.isOwn ? replaceFile(path, "new", reason_) : writeByUnlinkAndCreate(path, "new", c.mode, reason_);
+    ASSERT_TRUE(isReplaced) << reason_;
+    EXPECT_EQ(readTextFile(path, reason_), "new");
+    EXPECT_EQ(folder_.read("b.txt"), "an old and longer content") << "the old file itself was written";
+    EXPECT_EQ(modeOf("a.txt"), c.mode);
+    std::filesystem::remove(folder_ / "b.txt");
+  }
+  const mode_t mask = ::umask(027);
+  EXPECT_TRUE(replaceFile(folder_ / "first.txt", "x", reason_)) << reason_;
+  ::umask(mask);
+  EXPECT_EQ(modeOf("first.txt"), 0640U);
+}
+
+TEST_F(Files, WhatCannotBeReplacedStaysAndNothingIsLeftBeside) {
+  folder_.write("folder/old.txt", "old");
+  EXPECT_FALSE(replaceFile(folder_ / "folder", "new", reason_));
+  EXPECT_EQ(reason_, "Is a directory");
+  EXPECT_EQ(folder_.read("folder/old.txt"), "old");
+  EXPECT_FALSE(folder_.exists("folder.tmp"));
+  folder_.write("a.txt", "old");
+  folder_.write("a.txt.tmp/in the way", "");
+  EXPECT_FALSE(replaceFile(folder_ / "a.txt", "new", reason_));
+  EXPECT_EQ(reason_, "Is a directory");
+  EXPECT_EQ(folder_.read("a.txt"), "old");
 }
 
 TEST_F(Files, SaysTheSystemsReason) {
-  EXPECT_FALSE(readTextFile(path("none.txt"), reason_).has_value());
+  EXPECT_FALSE(readTextFile(folder_ / "none.txt", reason_).has_value());
   EXPECT_EQ(reason_, "No such file or directory");
-  EXPECT_FALSE(readTextFile(folder_.string(), reason_).has_value());
+  EXPECT_FALSE(readTextFile(folder_.path(), reason_).has_value());
   EXPECT_EQ(reason_, "Is a directory");
-  ASSERT_EQ(::mkfifo(path("pipe").c_str(), 0600), 0);
-  for (const std::string& endless : {path("pipe"), std::string("/dev/zero")}) {
+  ASSERT_EQ(::mkfifo((folder_ / "pipe").c_str(), 0600), 0);
+  for (const std::string& endless : {folder_ / "pipe", std::string("/dev/zero")}) {
     EXPECT_FALSE(readTextFile(endless, reason_).has_value());
     EXPECT_EQ(reason_, "Not a regular file");
     EXPECT_EQ(faultOfFile(endless), "Not a regular file");
   }
-  EXPECT_EQ(faultOfFile(path("none.txt")), "No such file or directory");
-  EXPECT_FALSE(writeByUnlinkAndCreate(path("none/a.txt"), "x", 0644, reason_));
+  EXPECT_EQ(faultOfFile(folder_ / "none.txt"), "No such file or directory");
+  EXPECT_FALSE(writeByUnlinkAndCreate(folder_ / "none/a.txt", "x", 0644, reason_));
   EXPECT_EQ(reason_, "No such file or directory");
 }
 
