@@ -35,6 +35,7 @@
 #include <sys/syscall.h>
 #include <sys/time.h>
 #include <time.h>
+#include <type_traits>
 #include <unistd.h>
 
 namespace {
@@ -58,9 +59,20 @@ long callsMet = 0;  ///< that are like the one that is to fail
 bool shortWriteWasMade = false;
 long clockLooks = 0;
 
+/// The C library's function of that name.
 template <typename Function>
 Function* original(const char* name) {
   return reinterpret_cast<Function*>(::dlsym(RTLD_NEXT, name));
+}
+
+/// What a function of the C library returns where it fails.
+template <typename Result>
+Result failure() {
+  if constexpr (std::is_pointer_v<Result>) {
+    return nullptr;
+  } else {
+    return -1;
+  }
 }
 
 template <std::size_t kSize>
@@ -124,11 +136,6 @@ bool fails(const char* call, const char* path) {
   return true;
 }
 
-bool fails(const char* call, int folder, const char* path) {
-  if (path[0] == '/' || folder == AT_FDCWD) return fails(call, path);
-  return false;
-}
-
 /// The same for a call on a descriptor.
 bool failsOn(const char* call, int descriptor) {
   if (!settings.active) return false;
@@ -145,10 +152,6 @@ bool isWritable(int flags) {
   return (flags & O_ACCMODE) != O_RDONLY;
 }
 
-unsigned modeFrom(int flags, va_list arguments) {
-  return (flags & (O_CREAT | O_TMPFILE)) != 0 ? va_arg(arguments, unsigned) : 0;
-}
-
 const char* openName(int flags) {
   return isWritable(flags) ? "open-to-write" : "open-to-read";
 }
@@ -157,28 +160,73 @@ long shiftOfClock() {
   return settings.active ? settings.clockStep * ++clockLooks : 0;
 }
 
+int openWith(int (*real)(const char*, int, ...), const char* path, int flags, va_list arguments) {
+  const unsigned mode = (flags & (O_CREAT | O_TMPFILE)) != 0 ? va_arg(arguments, unsigned) : 0;
+  return fails(openName(flags), path) ? failure<int>() : real(path, flags, mode);
+}
+
 }  // namespace
+
+/// A function of the C library that fails where `isToFail` holds, an expression of its parameters. `parameters` are
+/// written as in a declaration, `noexcept` included, `arguments` as in a call.
+#define MAY_FAIL(Result, name, parameters, arguments, isToFail)   \
+  Result name parameters {                                        \
+    static auto* const real = original<Result parameters>(#name); \
+    return (isToFail) ? failure<Result>() : real arguments;       \
+  }
+
+/// The two names of opening a file.
+#define OPEN_MAY_FAIL(name)                                                     \
+  int name(const char* path, int flags, ...) {                                  \
+    static auto* const real = original<int(const char* path, int, ...)>(#name); \
+    va_list arguments;                                                          \
+    va_start(arguments, flags);                                                 \
+    const int descriptor = openWith(real, path, flags, arguments);              \
+    va_end(arguments);                                                          \
+    return descriptor;                                                          \
+  }
 
 extern "C" {
 
-int open(const char* path, int flags, ...) {
-  va_list arguments;
-  va_start(arguments, flags);
-  const unsigned mode = modeFrom(flags, arguments);
-  va_end(arguments);
-  if (fails(openName(flags), path)) return -1;
-  static auto* const real = original<int(const char*, int, ...)>("open");
-  return real(path, flags, mode);
-}
+OPEN_MAY_FAIL(open)
+OPEN_MAY_FAIL(open64)
+MAY_FAIL(ssize_t, read, (int descriptor, void* bytes, size_t count), (descriptor, bytes, count),
+         failsOn("read", descriptor))
+MAY_FAIL(int, fsync, (int descriptor), (descriptor), failsOn("fsync", descriptor))
+MAY_FAIL(int, ftruncate, (int descriptor, off_t length) noexcept, (descriptor, length), failsOn("truncate", descriptor))
+MAY_FAIL(int, fchmod, (int descriptor, mode_t mode) noexcept, (descriptor, mode), failsOn("chmod", descriptor))
+MAY_FAIL(int, futimens, (int descriptor, const timespec times[2]) noexcept, (descriptor, times),
+         failsOn("set-times", descriptor))
+MAY_FAIL(int, utimensat, (int folder, const char* path, const timespec times[2], int flags) noexcept,
+         (folder, path, times, flags), (path[0] == '/' || folder == AT_FDCWD) && fails("set-times", path))
+MAY_FAIL(int, rename, (const char* from, const char* to) noexcept, (from, to), fails("rename", from))
+MAY_FAIL(int, mkdir, (const char* path, mode_t mode) noexcept, (path, mode), fails("mkdir", path))
+MAY_FAIL(int, unlink, (const char* path) noexcept, (path), fails("unlink", path))
+MAY_FAIL(int, rmdir, (const char* path) noexcept, (path), fails("rmdir", path))
+MAY_FAIL(int, symlink, (const char* content, const char* path) noexcept, (content, path), fails("symlink", path))
+MAY_FAIL(ssize_t, readlink, (const char* path, char* buffer, size_t size) noexcept, (path, buffer, size),
+         fails("readlink", path))
+MAY_FAIL(int, access, (const char* path, int mode) noexcept, (path, mode), fails("access", path))
+MAY_FAIL(int, stat, (const char* path, struct stat* status) noexcept, (path, status), fails("stat", path))
+MAY_FAIL(int, lstat, (const char* path, struct stat* status) noexcept, (path, status), fails("stat", path))
+MAY_FAIL(DIR*, opendir, (const char* path), (path), fails("open-folder", path))
+MAY_FAIL(dirent*, readdir, (DIR * folder), (folder), failsOn("read-folder", ::dirfd(folder)))
+MAY_FAIL(pid_t, fork, (), (), fails("fork", "(process)"))
 
-int open64(const char* path, int flags, ...) {
+// The ways to copy are one call: a disk that is full is so for each of them.
+MAY_FAIL(ssize_t, copy_file_range,
+         (int from, off64_t* fromOffset, int to, off64_t* toOffset, size_t count, unsigned flags),
+         (from, fromOffset, to, toOffset, count, flags), failsOn("copy", to))
+MAY_FAIL(ssize_t, sendfile, (int to, int from, off_t* offset, size_t count), (to, from, offset, count),
+         failsOn("copy", to))
+
+int ioctl(int descriptor, unsigned long request, ...) {
   va_list arguments;
-  va_start(arguments, flags);
-  const unsigned mode = modeFrom(flags, arguments);
+  va_start(arguments, request);
+  void* argument = va_arg(arguments, void*);
   va_end(arguments);
-  if (fails(openName(flags), path)) return -1;
-  static auto* const real = original<int(const char*, int, ...)>("open64");
-  return real(path, flags, mode);
+  static auto* const real = original<int(int, unsigned long, ...)>("ioctl");
+  return failsOn("copy", descriptor) ? -1 : real(descriptor, request, argument);
 }
 
 ssize_t write(int descriptor, const void* bytes, size_t count) {
@@ -194,11 +242,6 @@ ssize_t write(int descriptor, const void* bytes, size_t count) {
   return real(descriptor, bytes, count / 2);
 }
 
-ssize_t read(int descriptor, void* bytes, size_t count) {
-  static auto* const real = original<ssize_t(int, void*, size_t)>("read");
-  return failsOn("read", descriptor) ? -1 : real(descriptor, bytes, count);
-}
-
 /// A network file system may tell of a write that it could not make only here.
 int close(int descriptor) {
   static auto* const real = original<int(int)>("close");
@@ -208,111 +251,6 @@ int close(int descriptor) {
   const int result = real(descriptor);
   if (failed) errno = error;
   return failed ? -1 : result;
-}
-
-// The ways to copy are one call: a disk that is full is so for each of them.
-int ioctl(int descriptor, unsigned long request, ...) {
-  va_list arguments;
-  va_start(arguments, request);
-  void* argument = va_arg(arguments, void*);
-  va_end(arguments);
-  static auto* const real = original<int(int, unsigned long, ...)>("ioctl");
-  return failsOn("copy", descriptor) ? -1 : real(descriptor, request, argument);
-}
-
-ssize_t copy_file_range(int from, off64_t* fromOffset, int to, off64_t* toOffset, size_t count, unsigned flags) {
-  static auto* const real = original<ssize_t(int, off64_t*, int, off64_t*, size_t, unsigned)>("copy_file_range");
-  return failsOn("copy", to) ? -1 : real(from, fromOffset, to, toOffset, count, flags);
-}
-
-ssize_t sendfile(int to, int from, off_t* offset, size_t count) {
-  static auto* const real = original<ssize_t(int, int, off_t*, size_t)>("sendfile");
-  return failsOn("copy", to) ? -1 : real(to, from, offset, count);
-}
-
-int fsync(int descriptor) {
-  static auto* const real = original<int(int)>("fsync");
-  return failsOn("fsync", descriptor) ? -1 : real(descriptor);
-}
-
-int ftruncate(int descriptor, off_t length) noexcept {
-  static auto* const real = original<int(int, off_t)>("ftruncate");
-  return failsOn("truncate", descriptor) ? -1 : real(descriptor, length);
-}
-
-int fchmod(int descriptor, mode_t mode) noexcept {
-  static auto* const real = original<int(int, mode_t)>("fchmod");
-  return failsOn("chmod", descriptor) ? -1 : real(descriptor, mode);
-}
-
-int rename(const char* from, const char* to) noexcept {
-  static auto* const real = original<int(const char*, const char*)>("rename");
-  return fails("rename", from) ? -1 : real(from, to);
-}
-
-int mkdir(const char* path, mode_t mode) noexcept {
-  static auto* const real = original<int(const char*, mode_t)>("mkdir");
-  return fails("mkdir", path) ? -1 : real(path, mode);
-}
-
-int unlink(const char* path) noexcept {
-  static auto* const real = original<int(const char*)>("unlink");
-  return fails("unlink", path) ? -1 : real(path);
-}
-
-int rmdir(const char* path) noexcept {
-  static auto* const real = original<int(const char*)>("rmdir");
-  return fails("rmdir", path) ? -1 : real(path);
-}
-
-int symlink(const char* content, const char* path) noexcept {
-  static auto* const real = original<int(const char*, const char*)>("symlink");
-  return fails("symlink", path) ? -1 : real(content, path);
-}
-
-ssize_t readlink(const char* path, char* buffer, size_t size) noexcept {
-  static auto* const real = original<ssize_t(const char*, char*, size_t)>("readlink");
-  return fails("readlink", path) ? -1 : real(path, buffer, size);
-}
-
-int access(const char* path, int mode) noexcept {
-  static auto* const real = original<int(const char*, int)>("access");
-  return fails("access", path) ? -1 : real(path, mode);
-}
-
-int stat(const char* path, struct stat* status) noexcept {
-  static auto* const real = original<int(const char*, struct stat*)>("stat");
-  return fails("stat", path) ? -1 : real(path, status);
-}
-
-int lstat(const char* path, struct stat* status) noexcept {
-  static auto* const real = original<int(const char*, struct stat*)>("lstat");
-  return fails("stat", path) ? -1 : real(path, status);
-}
-
-int utimensat(int folder, const char* path, const timespec times[2], int flags) noexcept {
-  static auto* const real = original<int(int, const char*, const timespec*, int)>("utimensat");
-  return fails("set-times", folder, path) ? -1 : real(folder, path, times, flags);
-}
-
-int futimens(int descriptor, const timespec times[2]) noexcept {
-  static auto* const real = original<int(int, const timespec*)>("futimens");
-  return failsOn("set-times", descriptor) ? -1 : real(descriptor, times);
-}
-
-DIR* opendir(const char* path) {
-  static auto* const real = original<DIR*(const char*)>("opendir");
-  return fails("open-folder", path) ? nullptr : real(path);
-}
-
-dirent* readdir(DIR* folder) {
-  static auto* const real = original<dirent*(DIR*)>("readdir");
-  return failsOn("read-folder", ::dirfd(folder)) ? nullptr : real(folder);
-}
-
-pid_t fork() {
-  static auto* const real = original<pid_t()>("fork");
-  return fails("fork", "(process)") ? -1 : real();
 }
 
 int clone(int (*function)(void*), void* stack, int flags, void* argument, ...) noexcept {
