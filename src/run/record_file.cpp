@@ -15,6 +15,28 @@
 #include "run/signal_handlers.h"
 
 namespace mirevo {
+namespace {
+
+[[noreturn]] void failToKeep(const std::string& path, const std::string& reason) {
+  fatalError("Error: Unable to keep the earlier file " + path, reason);
+}
+
+/// A dot in a folder's name is its setup's and begins no ending.
+std::string firstFreeName(const std::string& path, bool isFolder) {
+  const std::size_t nameStart = path.rfind('/') == std::string::npos ? 0 : path.rfind('/') + 1;
+  const std::size_t dot = path.rfind('.');
+  const std::size_t stemEnd = isFolder || dot == std::string::npos || dot <= nameStart ? path.size() : dot;
+  for (int number = 1;; ++number) {
+    const std::string name = fmt::format("{}.{}{}", path.substr(0, stemEnd), number, path.substr(stemEnd));
+    struct stat status {};
+    if (::lstat(name.c_str(), &status) == 0) continue;
+    if (errno == ENOENT) return name;
+    const char* reason = std::strerror(errno);  // something may be there, and would be lost
+    failToKeep(path, fmt::format("{}: {}", name, reason));
+  }
+}
+
+}  // namespace
 
 RecordFile::~RecordFile() {
   std::string reason;
@@ -90,20 +112,13 @@ std::string keepEarlierFile(const std::string& path) {
   struct stat status {};
   if (::lstat(path.c_str(), &status) != 0) {
     if (errno == ENOENT || errno == ENOTDIR) return {};
-    fatalError("Error: Unable to keep the earlier file " + path, std::strerror(errno));
+    failToKeep(path, std::strerror(errno));
   }
   if (!S_ISREG(status.st_mode) && !S_ISDIR(status.st_mode)) return {};
-  const std::size_t nameStart = path.rfind('/') == std::string::npos ? 0 : path.rfind('/') + 1;
-  const std::size_t dot = path.rfind('.');
-  const std::size_t stemEnd = dot == std::string::npos || dot <= nameStart ? path.size() : dot;
-  std::string kept;
-  for (int number = 1; kept.empty() || ::lstat(kept.c_str(), &status) == 0; ++number) {
-    kept = fmt::format("{}.{}{}", path.substr(0, stemEnd), number, path.substr(stemEnd));
-  }
+  const std::string kept = firstFreeName(path, S_ISDIR(status.st_mode));
   if (::rename(path.c_str(), kept.c_str()) != 0) {
     const char* reason = std::strerror(errno);
-    fatalError("Error: Unable to keep the earlier file " + path,
-               fmt::format("It cannot be renamed to {}: {}", kept, reason));
+    failToKeep(path, fmt::format("It cannot be renamed to {}: {}", kept, reason));
   }
   return kept;
 }

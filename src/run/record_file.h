@@ -49,8 +49,8 @@ class RecordFile final {
 };
 
 /// Keeps an earlier run's file or folder from being overwritten: renames `path` to the first free of
-/// `<stem>.1<ending>`, `<stem>.2<ending>` ... and returns that name; empty when there is nothing to keep, or something
-/// that is neither (a device). Throws FatalError when it cannot be looked at or renamed.
+/// `<stem>.1<ending>`, `<stem>.2<ending>` ..., a folder `<name>.1`, and returns that name; empty when there is nothing
+/// to keep, or something that is neither (a device). Throws FatalError when it cannot be looked at or renamed.
 std::string keepEarlierFile(const std::string& path);
 
 }  // namespace mirevo

@@ -14,10 +14,12 @@ namespace mirevo::testing {
 struct Expectation {
   std::vector<std::string> names = {};  ///< the message names one of these files; none: it need not name one
   std::string reason = {};              ///< the system's, "No space left on device"; empty: any
+  std::string otherReason = {};         ///< that of the call which follows and tells of it instead
   bool mayPassSilently = false;         ///< a run that ends well need not mention it
   bool mayFailEvaluation = false;       ///< it makes a model run fail, and is told of where such are
   bool logMayLackMessage = false;       ///< the log is what fails, or is not open yet
   bool mayBeToldInReport = false;       ///< what only the report lacks, the report says
+  bool mayBeToldBehindLog = false;      ///< it happens when the log is closed, and standard error tells of it
   bool resultFileFails = false;         ///< rows that the log tells of may be missing from the result file
 };
 
@@ -51,7 +53,8 @@ class FaultyRun {
 
   /// What is wrong with a run that met a fault, besides what `program` says: whole rows, nothing lost, none left.
   std::vector<std::string> check(const ProgramResult& program, const Expectation& expected) const;
-  /// What is wrong with running the setup once more, now undisturbed. A restart must take up every row that stands.
+  /// What is wrong with running the setup once more, now undisturbed. A restart must take up every row that stands,
+  /// also that of an evaluation that the fault made fail.
   std::vector<std::string> checkNextRun() const;
   /// What is wrong with the rows of the result file as it stands.
   std::vector<std::string> checkRows(const Expectation& expected) const;
@@ -64,6 +67,7 @@ class FaultyRun {
   void checkMessage(const ProgramResult& program, const Expectation& expected,
                     std::vector<std::string>& problems) const;
   std::vector<std::string> checkEarlierFiles() const;
+  bool hasFailedEvaluation() const;
 
   ModelFolder folder_;
   std::set<std::string> inputs_;  ///< the names in the folder before any run

@@ -80,7 +80,7 @@ std::string kindOf(const std::string& path) {
   if (path == "basin.kdx") return "setup file";
   if (path.find("_Restart.dat") != std::string::npos) return "restart settings";
   if (path.find("_Simulated.bin") != std::string::npos) return "simulated values";
-  if (isIn("basin.log") || isIn("basin.1.log")) return "run log";
+  if (isIn("basin.") && path.ends_with(".log")) return "run log";
   if (path == "basin._spi_") return "message file";
   if (path == "basin._kill_") return "kill file";
   if (isIn("calSimErr")) return "failed-run file";
@@ -149,6 +149,9 @@ Expectation expectationOf(const Fault& fault, const FaultyRun& run) {
   expected.mayFailEvaluation = kind == "simulated series" || kind == "starting processes" || kind == "batch log";
   expected.mayBeToldInReport = (kind == "series file" || kind == "failed-run file") &&
                                (fault.call.first == "read" || fault.call.first == "open-to-read");
+  expected.mayBeToldBehindLog = kind == "message file";  // its last records follow the log's end
+  // Making a folder goes on without knowing what is there, and fails for what is missing.
+  if (kind == "saved output files" && fault.call.first == "stat") expected.otherReason = std::strerror(ENOENT);
   expected.resultFileFails = path.starts_with(run.resultFileName());
   return expected;
 }

@@ -117,15 +117,21 @@ TEST_F(ResultFileTest, ARowThatDoesNotFitLeavesNoTornHalf) {
 
 TEST(KeepEarlierFile, NumbersWithoutOverwriting) {
   const TemporaryFolder folder;
-  for (const char* content : {"first", "second"}) {
-    folder.write("a.b/r.dat", content);
-    keepEarlierFile((folder / "a.b/r.dat"));
+  const struct {
+    const char* name;
+    const char* madeFile;
+    const char* kept;
+  } cases[] = {{"a.b/r.dat", "a.b/r.dat", "a.b/r.1.dat"},
+               {"a.b/r.dat", "a.b/r.dat", "a.b/r.2.dat"},
+               {"a.b/r.dat", nullptr, ""},
+               {"a.b/no_ending", "a.b/no_ending", "a.b/no_ending.1"},
+               {"v1.1.2_Saved", "v1.1.2_Saved/1/out.csv", "v1.1.2_Saved.1"}};
+  for (const auto& c : cases) {
+    if (c.madeFile != nullptr) folder.write(c.madeFile, c.kept);
+    EXPECT_EQ(keepEarlierFile(folder / c.name), *c.kept == '\0' ? "" : folder / c.kept);
   }
-  folder.write("a.b/noending", "x");
-  EXPECT_EQ(keepEarlierFile((folder / "a.b/noending")), (folder / "a.b/noending.1"));
-  EXPECT_EQ(folder.read("a.b/r.1.dat"), "first");
-  EXPECT_EQ(folder.read("a.b/r.2.dat"), "second");
-  EXPECT_EQ(keepEarlierFile((folder / "a.b/r.dat")), "");
+  EXPECT_EQ(folder.read("a.b/r.1.dat"), "a.b/r.1.dat");
+  EXPECT_EQ(folder.read("v1.1.2_Saved.1/1/out.csv"), "v1.1.2_Saved.1");
   EXPECT_EQ(keepEarlierFile("/dev/full"), "");
 }
 
