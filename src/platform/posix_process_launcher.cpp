@@ -235,7 +235,8 @@ bool PosixProcessLauncher::renewLog(Slot& slot) {
   if (slot.log >= 0 && ::fstat(slot.log, &status) == 0 && status.st_size == 0 && status.st_nlink > 0) return true;
   if (slot.log >= 0) ::close(slot.log);
   const std::string path = slot.folder + "/" + kBatchLogName;
-  ::unlink(path.c_str());
+  slot.log = -1;
+  if (::unlink(path.c_str()) != 0 && errno != ENOENT) return false;
   slot.log = openAboveStandard(path.c_str(), O_RDWR | O_CREAT | O_EXCL | O_APPEND, 0666);
   return slot.log >= 0;
 }
