@@ -10,11 +10,11 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "common/fatal_error.h"
 #include "common/text.h"
 #include "evaluation/evaluation_observer.h"
 #include "evaluation/local_evaluator.h"
 #include "evaluation/model_run.h"
+#include "refusal.h"
 #include "temporary_folder.h"
 
 namespace mirevo {

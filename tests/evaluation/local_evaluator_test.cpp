@@ -115,18 +115,14 @@ TEST_F(LocalEvaluatorTest, TheFailureAfterTheLimitEndsTheRunOnceItIsOnRecord) {
     observer_.events.clear();
     FakeLauncher launcher([&](int, const std::string&) { return fails(1.0); });
     LocalEvaluator& evaluator = makeEvaluator(launcher, 1, c.planned);
-    try {
-      evaluator.evaluateParameterSets(std::vector<ParameterSet>(5, {2.0}), DispatchMode::task);
-      FAIL();
-    } catch (const FatalError& error) {
-      EXPECT_EQ(error.message(), "Error: Unable to continue. No of failed simulations too high.");
-      EXPECT_EQ(error.detail(),
-                fmt::format("failed evaluations: {}; at most {} may fail, a tenth of the {} planned\n"
-                            "the last of them, No. {}: run.sh exited with code 3\n| reading\n| no convergence",
-                            c.fatalFailure, c.planned / 10, c.planned, c.fatalFailure));
-      EXPECT_EQ(observer_.events.back(), fmt::format("record {} a=2 FAILED", c.fatalFailure));
-      EXPECT_EQ(launcher.starts, c.fatalFailure);
-    }
+    const std::vector<ParameterSet> sets(5, {2.0});
+    EXPECT_EQ(refusalOf([&] { evaluator.evaluateParameterSets(sets, DispatchMode::task); }),
+              fmt::format("Error: Unable to continue. No of failed simulations too high.\n"
+                          "failed evaluations: {}; at most {} may fail, a tenth of the {} planned\n"
+                          "the last of them, No. {}: run.sh exited with code 3\n| reading\n| no convergence",
+                          c.fatalFailure, c.planned / 10, c.planned, c.fatalFailure));
+    EXPECT_EQ(observer_.events.back(), fmt::format("record {} a=2 FAILED", c.fatalFailure));
+    EXPECT_EQ(launcher.starts, c.fatalFailure);
   }
 }
 
@@ -222,15 +218,11 @@ TEST_F(LocalEvaluatorTest, AnotherSetUnderTheSameNumberIsNoReplay) {
   FakeLauncher launcher([&](int, const std::string&) { return computes(1.0); });
   takeUp({{2, 3.0}});
   LocalEvaluator& evaluator = makeEvaluator(launcher, 1, 10);
-  const double next = std::nextafter(3.0, 4.0);
-  try {
-    evaluator.evaluateParameterSets(std::vector<ParameterSet>{{1.0}, {next}}, DispatchMode::task);
-    ADD_FAILURE() << "took another set's result";
-  } catch (const FatalError& error) {
-    EXPECT_EQ(error.message(), "Error: Unable to continue the earlier run");
-    EXPECT_THAT(error.detail(), testing::StartsWith("evaluation No. 2 has a = 3 in the earlier results, and "
-                                                    "3.0000000000000004 now, though the settings are the same."));
-  }
+  const std::vector<ParameterSet> sets{{1.0}, {std::nextafter(3.0, 4.0)}};
+  EXPECT_THAT(refusalOf([&] { evaluator.evaluateParameterSets(sets, DispatchMode::task); }),
+              testing::StartsWith("Error: Unable to continue the earlier run\n"
+                                  "evaluation No. 2 has a = 3 in the earlier results, and 3.0000000000000004 now, "
+                                  "though the settings are the same."));
 }
 
 TEST_F(LocalEvaluatorTest, TheFoldersOfTheFirstFailedRunsAreKept) {

@@ -7,6 +7,7 @@
 namespace mirevo {
 namespace {
 
+using testing::AllOf;
 using testing::ElementsAre;
 using testing::HasSubstr;
 using Kind = EvaluationFailure::Kind;
@@ -30,12 +31,7 @@ class ModelRunTest : public EvaluationTest {
   }
   /// The message of the FatalError that making the runner ends in.
   std::string refusal() {
-    try {
-      makeRunner(launcher_, 1);
-      return "none";
-    } catch (const FatalError& error) {
-      return error.message() + "\n" + error.detail();
-    }
+    return refusalOf([this] { makeRunner(launcher_, 1); });
   }
 
   FakeLauncher::Batch batch_;
@@ -128,14 +124,10 @@ TEST_F(ModelRunTest, MeasuresThatCannotBeComputedEndTheRunNamingTheSlotsFile) {
   description_.period = {{1999, 1, 1}, {1999, 12, 31}};
   makeRunner(launcher_, 1);
   writes("simulated.csv", series(4.0));
-  try {
-    evaluate(2.0);
-    FAIL();
-  } catch (const FatalError& error) {
-    EXPECT_EQ(error.message(), "Error: No simulated data found at observation times for item No. 1 in " +
-                                   (folder_ / "base/simulated.csv"));
-    EXPECT_THAT(error.detail(), HasSubstr("read from " + (folder_ / "run_Process1/simulated.csv")));
-  }
+  EXPECT_THAT(refusalOf([this] { evaluate(2.0); }),
+              AllOf(testing::StartsWith("Error: No simulated data found at observation times for item No. 1 in " +
+                                        folder_ / "base/simulated.csv" + "\n"),
+                    HasSubstr("read from " + folder_ / "run_Process1/simulated.csv")));
 }
 
 TEST_F(ModelRunTest, ARunThatStopsBeforeThePeriodIsAFailedEvaluation) {
@@ -255,12 +247,8 @@ TEST_F(ModelRunTest, CrossSectionFilesHaveTheirResistanceNumbersUpdated) {
   };
   for (const auto& [outcome, text] : texts) {
     launcher_.resistanceUpdate = outcome;
-    try {
-      runner_->prepareModelRun(std::vector<double>{2.0}, 1);
-      FAIL() << text;
-    } catch (const FatalError& error) {
-      EXPECT_EQ(error.message(), std::string("Error updating resistance numbers: ") + text);
-    }
+    EXPECT_EQ(refusalMessageOf([this] { runner_->prepareModelRun(std::vector<double>{2.0}, 1); }),
+              std::string("Error updating resistance numbers: ") + text);
   }
 }
 

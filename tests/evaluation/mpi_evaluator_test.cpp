@@ -9,9 +9,11 @@
 namespace mirevo {
 namespace {
 
+using testing::AllOf;
 using testing::Contains;
 using testing::ElementsAre;
 using testing::HasSubstr;
+using testing::StartsWith;
 
 /// A master with workers that answer when the test lets them: each result is the set's value less 1.
 class MpiEvaluatorTest : public EvaluationTest {
@@ -119,13 +121,10 @@ TEST_F(MpiEvaluatorTest, FailedRunsOfAllWorkersCountTogether) {
     ResultMessage failed{runner_->failedResult({EvaluationFailure::Kind::exitCode, "code 3", {"last words"}}), "left"};
     channel_.deliver(message.rank, RankMessage::result, encode(failed));
   };
-  try {
-    master.evaluateParameterSets(std::vector<ParameterSet>(4, {2.0}), DispatchMode::task);
-    FAIL();
-  } catch (const FatalError& error) {
-    EXPECT_EQ(error.message(), "Error: Unable to continue. No of failed simulations too high.");
-    EXPECT_THAT(error.detail(), HasSubstr("code 3\n| last words"));
-  }
+  const std::vector<ParameterSet> sets(4, {2.0});
+  EXPECT_THAT(refusalOf([&] { master.evaluateParameterSets(sets, DispatchMode::task); }),
+              AllOf(StartsWith("Error: Unable to continue. No of failed simulations too high.\n"),
+                    HasSubstr("code 3\n| last words")));
   EXPECT_EQ(failedRuns_->failedCount(), 2);
   EXPECT_THAT(observer_.events, Contains("warning: Evaluation of parameter set No. 1: left"));
 }
@@ -135,13 +134,8 @@ TEST_F(MpiEvaluatorTest, AWorkersFatalErrorIsTheMastersWithItsPlace) {
   becomeReady(1);
   becomeReady(2);
   channel_.deliver(2, RankMessage::failure, encode(FailureMessage{"Error: Unable to open x", "No space left"}));
-  try {
-    master.evaluateParameterSets(std::vector<ParameterSet>{{2.0}}, DispatchMode::task);
-    FAIL();
-  } catch (const FatalError& error) {
-    EXPECT_EQ(error.message(), "Error: Unable to open x");
-    EXPECT_EQ(error.detail(), "No space left\nreported by worker 2 on node");
-  }
+  EXPECT_EQ(refusalOf([&] { master.evaluateParameterSets(std::vector<ParameterSet>{{2.0}}, DispatchMode::task); }),
+            "Error: Unable to open x\nNo space left\nreported by worker 2 on node");
 }
 
 TEST_F(MpiEvaluatorTest, ACancelledRunStopsWhileWorkersAreBusy) {

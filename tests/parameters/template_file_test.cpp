@@ -1,19 +1,18 @@
 #include "parameters/template_file.h"
 
-#include <algorithm>
 #include <filesystem>
-#include <sys/stat.h>
-#include <unistd.h>
 
+#include <fmt/format.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "common/fatal_error.h"
-#include "common/files.h"
+#include "refusal.h"
+#include "temporary_folder.h"
 
 namespace mirevo {
 namespace {
 
+using ::testing::AllOf;
 using ::testing::ElementsAre;
 using ::testing::HasSubstr;
 using ::testing::StartsWith;
@@ -37,17 +36,6 @@ std::string converted(const std::string& line) {
   const std::string text = ConvertIdTemplate("model.tpl", line + "\n", parameters());
   EXPECT_EQ(text.substr(0, 2), "!\n");
   return text.substr(2, text.size() - 3);
-}
-
-template <typename Call>
-FatalError refused(Call call) {
-  try {
-    call();
-  } catch (const FatalError& error) {
-    return error;
-  }
-  ADD_FAILURE() << "not refused";
-  return FatalError("");
 }
 
 TEST(ConvertIdTemplate, ReplacesIdValues) {
@@ -90,10 +78,9 @@ TEST(ConvertIdTemplate, RefusesUndefinedIdValues) {
       {"x k=1e-35", "k=1e-35"},
   };
   for (const auto& c : cases) {
-    const FatalError error = refused([&] { converted(std::string("first line\n") + c.line); });
-    EXPECT_EQ(error.message(),
-              std::string("Error: Undefined parameter ID value ") + c.token + " found in template file");
-    EXPECT_THAT(error.detail(), HasSubstr("model.tpl:2:")) << c.line;
+    EXPECT_THAT(refusalOf([&] { converted(std::string("first line\n") + c.line); }),
+                StartsWith(std::string("Error: Undefined parameter ID value ") + c.token +
+                           " found in template file\nmodel.tpl:2:"));
   }
 }
 
@@ -101,12 +88,12 @@ TEST(ConvertIdTemplate, KeepsLinesAndEndsThemAlike) {
   EXPECT_EQ(ConvertIdTemplate("t", "a \r\n\r\n  b\t\r\nlast", parameters()), "!\na\n\n  b\t\nlast\n");
   EXPECT_EQ(ConvertIdTemplate("t", "", parameters()), "!\n");
   EXPECT_EQ(ConvertIdTemplate("t", std::string(50000, 'x') + "   ", parameters()).size(), 50003);
-  EXPECT_EQ(refused([] { ConvertIdTemplate("t", "a\n" + std::string(50001, 'x'), parameters()); }).message(),
-            "Error: Line 2 of template file t is too long");
   std::string many;
   for (int i = 0; i < 5000; ++i) many += " 1e-35";
-  EXPECT_EQ(refused([&] { ConvertIdTemplate("t", many, parameters()); }).message(),
-            "Error: Line 1 of template file t is too long");
+  for (const auto& [text, line] : {std::pair{"a\n" + std::string(50001, 'x'), 2}, {many, 1}}) {
+    EXPECT_EQ(refusalMessageOf([&, &content = text] { ConvertIdTemplate("t", content, parameters()); }),
+              fmt::format("Error: Line {} of template file t is too long", line));
+  }
 }
 
 TEST(ParameterTemplate, FillsPlaceholders) {
@@ -153,9 +140,8 @@ TEST(ParameterTemplate, RefusesWhatItCannotFill) {
       {"!\n!k!", "Error: Parameter name k in template file k invalid", "did you mean \"K\"?"},
   };
   for (const auto& c : cases) {
-    const FatalError error = refused([&] { ParameterTemplate("t", c.text, parameters()); });
-    EXPECT_EQ(error.message(), c.message) << c.text;
-    EXPECT_THAT(error.detail(), HasSubstr(c.detail)) << c.text;
+    EXPECT_THAT(refusalOf([&] { ParameterTemplate("t", c.text, parameters()); }),
+                AllOf(StartsWith(c.message + std::string("\n")), HasSubstr(c.detail)));
   }
 }
 
@@ -198,26 +184,18 @@ TEST(ParameterTemplate, WarnsOfNarrowPlaceholders) {
 }
 
 TEST(WriteParameterFile, RewritesAnExistingFileAndKeepsItsMode) {
-  const std::string folder = ::testing::TempDir() + "parameter_file_" + std::to_string(::getpid());
-  std::filesystem::create_directory(folder);
-  const std::string path = folder + "/model.inp";
-  std::string reason;
-  ASSERT_TRUE(writeByUnlinkAndCreate(path, "old and longer than what comes", 0640, reason));
+  const TemporaryFolder folder;
+  const std::string path = folder.write("model.inp", "old and longer than what comes", 0640);
   const ParameterTemplate parameterTemplate("t", "!\nK = !K   !\n", parameters());
   const std::vector<double> values(6, 3.25);
-
   WriteParameterFile(path + "  ", parameterTemplate, values);
-  EXPECT_EQ(readTextFile(path, reason), "K =   3.25\n");
-  struct stat status {};
-  ASSERT_EQ(::stat(path.c_str(), &status), 0);
-  EXPECT_EQ(status.st_mode & 07777, 0640);
+  EXPECT_EQ(folder.read("model.inp"), "K =   3.25\n");
+  EXPECT_EQ(std::filesystem::status(path).permissions(), std::filesystem::perms{0640});
 
-  const FatalError missing = refused([&] { WriteParameterFile(folder + "/none.inp", parameterTemplate, values); });
-  EXPECT_EQ(missing.message(), "Error: Unable to open " + folder + "/none.inp");
-  EXPECT_EQ(missing.detail(), "No such file or directory");
-  EXPECT_EQ(refused([&] { WriteParameterFile(folder, parameterTemplate, values); }).message(),
-            "Error: Unable to open " + folder);
-  std::filesystem::remove_all(folder);
+  EXPECT_EQ(refusalOf([&] { WriteParameterFile(folder / "none.inp", parameterTemplate, values); }),
+            "Error: Unable to open " + folder / "none.inp" + "\nNo such file or directory");
+  EXPECT_EQ(refusalMessageOf([&] { WriteParameterFile(folder.path(), parameterTemplate, values); }),
+            "Error: Unable to open " + folder.path());
 }
 
 }  // namespace

@@ -7,7 +7,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "common/fatal_error.h"
+#include "refusal.h"
 #include "temporary_folder.h"
 
 namespace mirevo {
@@ -157,18 +157,15 @@ TEST(ProcessFolder, KnowsItsOwnBehindALink) {
 TEST(ProcessFolder, NamesThePathThatCannotBeCopied) {
   const TemporaryFolder folder;
   folder.write("base/run.sh", "");
-  try {
-    makeProcessFolder(folder / "base", folder / "no/such/run_Process1", folder / "no/such/run_Process");
-    FAIL();
-  } catch (const FatalError& error) {
-    EXPECT_EQ(error.message(),
-              "Unable to create the folder " + (folder / "no/such/run_Process1") + ": No such file or directory");
-  }
-  try {
-    makeProcessFolder(folder / "missing", folder / "run_Process1", folder / "run_Process");
-    FAIL();
-  } catch (const FatalError& error) {
-    EXPECT_EQ(error.message(), "Unable to read the folder " + (folder / "missing") + ": No such file or directory");
+  const struct {
+    const char* source;
+    const char* target;
+    std::string refusal;
+  } cases[] = {{"base", "no/such/run_Process", "create the folder " + folder / "no/such/run_Process1"},
+               {"missing", "run_Process", "read the folder " + folder / "missing"}};
+  for (const auto& c : cases) {
+    EXPECT_EQ(refusalOf([&] { makeProcessFolder(folder / c.source, folder / c.target + "1", folder / c.target); }),
+              "Unable to " + c.refusal + ": No such file or directory");
   }
 }
 

@@ -6,8 +6,8 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "common/fatal_error.h"
 #include "common/text.h"
+#include "refusal.h"
 #include "run/failed_run_file.h"
 #include "temporary_folder.h"
 
@@ -81,13 +81,7 @@ TEST_F(ResultFileTest, RowsStayWhereTheyAreWhenTheyCannotBePutInOrder) {
 
 TEST_F(ResultFileTest, AFullDiskIsReportedOnceWithItsReason) {
   std::filesystem::create_symlink("/dev/full", path_);
-  try {
-    open();
-    FAIL() << "writing to a full disk succeeded";
-  } catch (const FatalError& error) {
-    EXPECT_EQ(error.message(), "Error: Unable to write to " + path_);
-    EXPECT_EQ(error.detail(), "No space left on device");
-  }
+  EXPECT_EQ(refusalOf([this] { open(); }), "Error: Unable to write to " + path_ + "\nNo space left on device");
   add(success(1, 1, 1), 1);
   std::string reason;
   EXPECT_FALSE(results_.finish({}, reason));

@@ -1,5 +1,6 @@
 #include "run/setup_reader.h"
 
+#include <fmt/format.h>
 #include <gmock/gmock.h>
 
 #include "run/setup_fixture.h"
@@ -42,110 +43,85 @@ TEST_F(SetupReaderTest, FillsTheConfigurationOfAnOptimisation) {
 
 TEST_F(SetupReaderTest, PlansTheEvaluationsOfEachTask) {
   const struct {
-    std::vector<Edit> edits;
+    const char* edits;
     int planned;
   } cases[] = {
-      {{{"Option = 2", "Option = 0"}, {"Scenario_Type = 1", "Scenario_Type = 0"}}, 1},
-      {{{"Option = 2", "Option = 0"}}, 1},
-      {{{"Option = 2", "Option = 1"}}, 5},
-      {{{"Option = 2", "Option = 1"}, {"Differencing = 1", "Differencing = 0"}}, 3},
-      {{{"Option = 2", "Option = 3"}}, 200},
-      {{{"Option = 2", "Option = 4"}}, 0},
+      {"Option = 2 => 0 & Scenario_Type = 1 => 0", 1}, {"Option = 2 => 0", 1},   {"Option = 2 => 1", 5},
+      {"Option = 2 => 1 & Differencing = 1 => 0", 3},  {"Option = 2 => 3", 200}, {"Option = 2 => 4", 0},
   };
-  for (const auto& row : cases) EXPECT_EQ(read(row.edits).plannedEvaluations(), row.planned) << row.edits[0].to;
+  for (const auto& row : cases) EXPECT_EQ(read(row.edits).plannedEvaluations(), row.planned) << row.edits;
 }
 
 TEST_F(SetupReaderTest, RefusesWhatCannotBeReadAndSaysWhere) {
   const std::string longText(256, 'x');
-  const std::string quote = "'";
+  const auto title = [](const std::string& text) { return "'Upper catchment   ' => '" + text + "'"; };
   const struct {
-    std::vector<Edit> edits;
-    std::string error;
-  } cases[] = {
-      {{{"Title = ", "Title "}},
-       "Error: Unable to open setup.kdx\nsetup.kdx:4:11: expected '=' after keyword \"Title\""},
-      {{{"[MIREVO_PARAMETERS]", "[MIREVO_PARAMETER]"}, {"[/MIREVO_PARAMETERS]", "[/MIREVO_PARAMETER]"}},
-       "Error: Unable to open section MIREVO_PARAMETERS in KDX file\nsetup.kdx: expected section "
-       "[MIREVO_PARAMETERS] in the file; found \"MIREVO_PARAMETER\", did you mean \"MIREVO_PARAMETERS\"?"},
-      {{{"[SIMPARAM]", "[SIMPARAMS]"}, {"[/SIMPARAM]", "[/SIMPARAMS]"}},
-       "Error: Unable to open section SIMPARAM in KDX file\nsetup.kdx:2:3: expected section [SIMPARAM] in section "
-       "MIREVO_SIMULATION_OPTION; found \"SIMPARAMS\", did you mean \"SIMPARAM\"?"},
-      {{{"TqSEKdxListItemCount = 3", "TqSEKdxListItemCount = 4"}},
-       "Error: Unable to open section PARAMETER_4 in KDX file\nsetup.kdx:19:3: expected section [PARAMETER_4] in "
-       "section "
-       "MODEL_PARAMETERS"},
-      {{{"[SimultaneousSimulations]", "[Simultaneous]"}, {"[/SimultaneousSimulations]", "[/Simultaneous]"}},
-       "Error: Unable to open section SimultaneousSimulations in KDX file\nsetup.kdx:1:1: expected section "
-       "[SimultaneousSimulations] in section MIREVO_PARAMETERS"},
-      {{{"    Option = 2", ""}},
-       "Error: Unable to read keyword in section MIREVO_SIMULATION_OPTION in KDX file\nsetup.kdx:2:3: Option: the "
-       "keyword is missing in section MIREVO_SIMULATION_OPTION"},
-      {{{"Lower_Bound = 6.5", "Lower_Bond = 6.5"}},
-       "Error: Unable to read keyword in section PARAMETER_3 in KDX file\nsetup.kdx:39:5: Lower_Bound: the keyword is "
-       "missing in section MODEL_PARAMETERS/PARAMETER_3; found \"Lower_Bond\", did you mean \"Lower_Bound\"?"},
-      {{{"TqSEKdxListItemCount = 3", ""}},
-       "Error: Unable to read keyword in section MODEL_PARAMETERS in KDX file\nsetup.kdx:19:3: TqSEKdxListItemCount: "
-       "the "
-       "keyword is missing in section MODEL_PARAMETERS"},
-      {{{"TqSEKdxListItemCount = 3", "TqSEKdxListItemCount = -3"}},
-       "Error: Unable to read keyword in section MODEL_PARAMETERS in KDX file\nsetup.kdx:20:5: TqSEKdxListItemCount: "
-       "expected 0 or more, found -3"},
-      {{{"Option = 2", "Option = 2.0"}},
-       "Error: Unable to read keyword in section MIREVO_SIMULATION_OPTION in KDX file\nsetup.kdx:3:14: Option: "
-       "expected "
-       "an integer within 32 bits, found 2.0"},
-      {{{"Option = 2", "Option = 2147483648"}},
-       "Error: Unable to read keyword in section MIREVO_SIMULATION_OPTION in KDX file\nsetup.kdx:3:14: Option: "
-       "expected "
-       "an integer within 32 bits, found 2147483648"},
-      {{{"Option = 2", "Option = 2, 3"}},
-       "Error: Unable to read keyword in section MIREVO_SIMULATION_OPTION in KDX file\nsetup.kdx:3:17: Option: "
-       "expected "
-       "one value, found 2"},
-      {{{"'Upper catchment   '", "2001-01-31"}},
-       "Error: Unable to read keyword in section MIREVO_SIMULATION_OPTION in KDX file\nsetup.kdx:4:13: Title: expected "
-       "a "
-       "text between quotes, found the date 2001-01-31 00:00"},
-      {{{"'Upper catchment   '", quote + longText + quote}},
-       "Error: Unable to read keyword in section MIREVO_SIMULATION_OPTION in KDX file\nsetup.kdx:4:13: Title: expected "
-       "a "
-       "text of at most 255 bytes, found 256"},
-      {{{"'Depth'\n    [/P", "' '\n    [/P"}},
-       "Error: Unable to read keyword in section PARAMETER_1 in KDX file\nsetup.kdx:31:24: Parameter_Name: expected a "
-       "name, found a blank text"},
-      {{{"'Depth'\n    [/P", "'a\tb'\n    [/P"}},
-       "Error: Unable to read keyword in section PARAMETER_1 in KDX file\nsetup.kdx:31:24: Parameter_Name: expected a "
-       "name without tabs, which separate the columns of the results"},
-      {{{"2001-01-31", "'January'"}},
-       "Error: Unable to read keyword in section ObjectiveFunctions in KDX file\nsetup.kdx:58:18: Start_Date: expected "
-       "a "
-       "date such as 2001-01-31 or 2001-01-31 12:30, found the text \"January\""},
-      {{{"412.5, 1, 99", "412.5, 'one', 99"}, {"Option = 2", "Option = 0"}},
-       "Error: Unable to read keyword in section SCENARIO_1 in KDX file\nsetup.kdx:108:29: Parameters: expected a "
-       "number, "
-       "found the text \"one\""},
+    std::string edits;
+    const char* section;  ///< whose keyword cannot be read
+    std::string detail;   ///< behind "setup.kdx:"
+  } keywords[] = {
+      {"    Option = 2 => ", "MIREVO_SIMULATION_OPTION",
+       "2:3: Option: the keyword is missing in section MIREVO_SIMULATION_OPTION"},
+      {"Lower_Bound = 6.5 => Lower_Bond = 6.5", "PARAMETER_3",
+       "39:5: Lower_Bound: the keyword is missing in section MODEL_PARAMETERS/PARAMETER_3; found \"Lower_Bond\", did "
+       "you mean \"Lower_Bound\"?"},
+      {"TqSEKdxListItemCount = 3 => ", "MODEL_PARAMETERS",
+       "19:3: TqSEKdxListItemCount: the keyword is missing in section MODEL_PARAMETERS"},
+      {"TqSEKdxListItemCount = 3 => -3", "MODEL_PARAMETERS",
+       "20:5: TqSEKdxListItemCount: expected 0 or more, found -3"},
+      {"Option = 2 => 2.0", "MIREVO_SIMULATION_OPTION", "3:14: Option: expected an integer within 32 bits, found 2.0"},
+      {"Option = 2 => 2147483648", "MIREVO_SIMULATION_OPTION",
+       "3:14: Option: expected an integer within 32 bits, found 2147483648"},
+      {"Option = 2 => 2, 3", "MIREVO_SIMULATION_OPTION", "3:17: Option: expected one value, found 2"},
+      {"'Upper catchment   ' => 2001-01-31", "MIREVO_SIMULATION_OPTION",
+       "4:13: Title: expected a text between quotes, found the date 2001-01-31 00:00"},
+      {title(longText), "MIREVO_SIMULATION_OPTION", "4:13: Title: expected a text of at most 255 bytes, found 256"},
+      {"'Depth'\n    [/P => ' '\n    [/P", "PARAMETER_1", "31:24: Parameter_Name: expected a name, found a blank text"},
+      {"'Depth'\n    [/P => 'a\tb'\n    [/P", "PARAMETER_1",
+       "31:24: Parameter_Name: expected a name without tabs, which separate the columns of the results"},
+      {"2001-01-31 => 'January'", "ObjectiveFunctions",
+       "58:18: Start_Date: expected a date such as 2001-01-31 or 2001-01-31 12:30, found the text \"January\""},
+      {"412.5, 1, 99 => 412.5, 'one', 99 & Option = 2 => 0", "SCENARIO_1",
+       "108:29: Parameters: expected a number, found the text \"one\""},
   };
-  for (const auto& row : cases) EXPECT_EQ(failure(row.edits), row.error) << row.edits.back().to;
-  EXPECT_EQ(failure({{"'Upper catchment   '", quote + longText.substr(1) + "   '"}}), "")
-      << "trailing blanks do not count";
-  EXPECT_EQ(failure({{"'Depth + Rate'", "'Depth + Rate + " + std::string(1000, '0') + "'"}}), "") << "free text";
+  for (const auto& row : keywords) {
+    EXPECT_EQ(failure(row.edits), fmt::format("Error: Unable to read keyword in section {} in KDX file\nsetup.kdx:{}",
+                                              row.section, row.detail));
+  }
+  const struct {
+    const char* edits;
+    const char* error;
+  } others[] = {
+      {"Title = => Title", " setup.kdx\nsetup.kdx:4:11: expected '=' after keyword \"Title\""},
+      {"[MIREVO_PARAMETERS] => [MIREVO_PARAMETER] & [/MIREVO_PARAMETERS] => [/MIREVO_PARAMETER]",
+       " section MIREVO_PARAMETERS in KDX file\nsetup.kdx: expected section [MIREVO_PARAMETERS] in the file; found "
+       "\"MIREVO_PARAMETER\", did you mean \"MIREVO_PARAMETERS\"?"},
+      {"[SIMPARAM] => [SIMPARAMS] & [/SIMPARAM] => [/SIMPARAMS]",
+       " section SIMPARAM in KDX file\nsetup.kdx:2:3: expected section [SIMPARAM] in section MIREVO_SIMULATION_OPTION; "
+       "found \"SIMPARAMS\", did you mean \"SIMPARAM\"?"},
+      {"TqSEKdxListItemCount = 3 => 4",
+       " section PARAMETER_4 in KDX file\nsetup.kdx:19:3: expected section [PARAMETER_4] in section MODEL_PARAMETERS"},
+      {"[SimultaneousSimulations] => [Simultaneous] & [/SimultaneousSimulations] => [/Simultaneous]",
+       " section SimultaneousSimulations in KDX file\nsetup.kdx:1:1: expected section [SimultaneousSimulations] in "
+       "section MIREVO_PARAMETERS"},
+  };
+  for (const auto& row : others) EXPECT_EQ(failure(row.edits), std::string("Error: Unable to open") + row.error);
+  EXPECT_EQ(failure(title(longText.substr(1) + "   ")), "") << "trailing blanks do not count";
+  EXPECT_EQ(failure("'Depth + Rate' => 'Depth + Rate + " + std::string(1000, '0') + "'"), "") << "free text";
 }
 
 TEST_F(SetupReaderTest, StopsAtTheFirstInvalidValueBeforeLaterSectionsAreRead) {
-  EXPECT_THAT(failure({{"Aggregation_Method = 0", "Aggregation_Method = 9"},
-                       {"[SAVE_OUTPUT_FILES]", "[SAVED]"},
-                       {"[/SAVE_OUTPUT_FILES]", "[/SAVED]"}}),
-              testing::StartsWith("Error: Objective function aggregation method invalid"));
-  EXPECT_THAT(failure({{"Option = 2", "Option = 0"},
-                       {"[OPTIMISATION_ALGORITHM]", "[X]"},
-                       {"[/OPTIMISATION_ALGORITHM]", "[/X]"},
-                       {"NoSimultaneousSim = 4", "NoSimultaneousSim = 0"}}),
+  EXPECT_THAT(
+      failure("Aggregation_Method = 0 => 9 & [SAVE_OUTPUT_FILES] => [SAVED] & [/SAVE_OUTPUT_FILES] => [/SAVED]"),
+      testing::StartsWith("Error: Objective function aggregation method invalid"));
+  EXPECT_THAT(failure("Option = 2 => 0 & [OPTIMISATION_ALGORITHM] => [X] & [/OPTIMISATION_ALGORITHM] => [/X] & "
+                      "NoSimultaneousSim = 4 => 0"),
               testing::StartsWith("Error: Invalid No. of processes"))
       << "a section that the run does not need may be absent";
 }
 
 TEST_F(SetupReaderTest, EchoesEverySectionAndValueInReadingOrder) {
-  const std::string log = logOf({{"Population_Size = 20", "Population_Size = 0"}});
+  const std::string log = logOf("Population_Size = 20 => 0");
   EXPECT_THAT(log, testing::StartsWith("[MIREVO_PARAMETERS]\n"
                                        "[MIREVO_SIMULATION_OPTION]\n"
                                        "  Option = 2\n"
@@ -180,56 +156,50 @@ TEST_F(SetupReaderTest, EchoesEverySectionAndValueInReadingOrder) {
 
 TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotRead) {
   const struct {
-    Edit edit;
+    const char* edits;
     const char* warning;
   } cases[] = {
-      {{"Weight_Above = 2.5", "Weigth_Above = 2.5"},
+      {"Weight_Above = 2.5 => Weigth_Above = 2.5",
        "setup.kdx:68:9: keyword \"Weigth_Above\" is unknown and not read, did you mean \"Weight_Above\"?"},
-      {{"Min_Change = 0.005", "Min_Change = 0.005\nMin_Change = 1.0"},
+      {"Min_Change = 0.005 => Min_Change = 0.005\nMin_Change = 1.0",
        "setup.kdx:149:1: keyword \"Min_Change\" stands at line 148 already, this one is not read"},
-      {{"[SCENARIOS]", "[Scenario][/Scenario][SCENARIOS]"},
+      {"[SCENARIOS] => [Scenario][/Scenario][SCENARIOS]",
        "setup.kdx:103:3: section \"Scenario\" is unknown and not read, did you mean \"SCENARIOS\"?"},
-      {{"TqSEKdxListItemCount = 3", "TqSEKdxListItemCount = 2"},
+      {"TqSEKdxListItemCount = 3 => 2",
        "setup.kdx:20:28: TqSEKdxListItemCount: 3 sections PARAMETER_n stand here, those beyond 2 are not read"},
-      {{"Function_Name = 'Flow'", "Function_Name = ''"},
+      {"Function_Name = 'Flow' => ''",
        "setup.kdx:91:16: Name: no output measure has this Function_Name, the objective function is always 0"},
-      {{"Use_Surrogate_Model = 1", "Use_Surrogate_Model = 2"},
-       "setup.kdx:123:27: Use_Surrogate_Model: neither 0 nor 1, no search will be run"},
-      {{"Max_No_Evaluations = 500", "Max_No_Evaluations = 3"},
-       "NoSimultaneousSim: only 3 can be used by the evaluations of this run"},
-      {{"Option = 2", "Option = 4"}, "setup.kdx:3:14: Option: no task has this number, nothing will be run"},
-      {{"[/MIREVO_PARAMETERS]", "[/MIREVO_PARAMETERS][MIREVO_PARAMETERS][/MIREVO_PARAMETERS]"},
+      {"Use_Surrogate_Model = 1 => 2", "setup.kdx:123:27: Use_Surrogate_Model: neither 0 nor 1, no search will be run"},
+      {"Max_No_Evaluations = 500 => 3", "NoSimultaneousSim: only 3 can be used by the evaluations of this run"},
+      {"Option = 2 => 4", "setup.kdx:3:14: Option: no task has this number, nothing will be run"},
+      {"[/MIREVO_PARAMETERS] => [/MIREVO_PARAMETERS][MIREVO_PARAMETERS][/MIREVO_PARAMETERS]",
        "a second [MIREVO_PARAMETERS] is not read"},
   };
-  EXPECT_THAT(logOf({{"[SCENARIOS]", "[TMEMPARAM]\nTmemOption = 1\n[/TMEMPARAM][SCENARIOS]"}}),
+  EXPECT_THAT(logOf("[SCENARIOS] => [TMEMPARAM]\nTmemOption = 1\n[/TMEMPARAM][SCENARIOS]"),
               testing::Not(HasSubstr("Warning")));
-  for (const auto& row : cases) EXPECT_THAT(logOf({row.edit}), HasSubstr(row.warning)) << row.edit.to;
+  for (const auto& row : cases) EXPECT_THAT(logOf(row.edits), HasSubstr(row.warning));
 }
 
 TEST_F(SetupReaderTest, WarnsOfSearchSettingsThatEndASearchEarly) {
-  const Edit sce{"Algorithm_Type = 1", "Algorithm_Type = 0"};
-  const Edit dds{"Algorithm_Type = 1", "Algorithm_Type = 2"};
   const struct {
-    std::vector<Edit> edits;
+    const char* edits;
     const char* warning;  ///< empty: none of these
   } cases[] = {
-      {{}, ""},  // two variable parameters, 20 = 4(2n + 1) points
-      {{{"Population_Size = 20", "Population_Size = 19"}, {"Neighbourhood_Size = 60", "Neighbourhood_Size = 50"}},
+      {"", ""},  // two variable parameters, 20 = 4(2n + 1) points
+      {"Population_Size = 20 => 19 & Neighbourhood_Size = 60 => 50",
        "Population_Size: found 19, at least 20 are advised for the number of variable parameters"},
-      {{{"No_Points_Simplex = 5", "No_Points_Simplex = 2"}}, "No_Points_Simplex: found 2, at least 3 are advised"},
-      {{sce}, ""},
-      {{sce,
-        {"No_Points_Complex = 7", "No_Points_Complex = 4"},
-        {"No_Points_Subcomplex = 6", "No_Points_Subcomplex = 2"}},
+      {"No_Points_Simplex = 5 => 2", "No_Points_Simplex: found 2, at least 3 are advised"},
+      {"Algorithm_Type = 1 => 0", ""},
+      {"Algorithm_Type = 1 => 0 & No_Points_Complex = 7 => 4 & No_Points_Subcomplex = 6 => 2",
        "No_Points_Complex: found 4, at least 5 are advised"},
-      {{sce, {"No_Points_Subcomplex = 6", "No_Points_Subcomplex = 2"}},
+      {"Algorithm_Type = 1 => 0 & No_Points_Subcomplex = 6 => 2",
        "No_Points_Subcomplex: found 2, at least 3 are advised"},
-      {{{"Max_No_Evaluations = 500", "Max_No_Evaluations = 19"}},
+      {"Max_No_Evaluations = 500 => 19",
        "Max_No_Evaluations: the initial sample of 20 sets is cut to 19, and no search follows"},
-      {{{"Max_No_Evaluations = 500", "Max_No_Evaluations = 20"}}, ""},
-      {{sce, {"Max_No_Evaluations = 500", "Max_No_Evaluations = 27"}},
+      {"Max_No_Evaluations = 500 => 20", ""},
+      {"Algorithm_Type = 1 => 0 & Max_No_Evaluations = 500 => 27",
        "Max_No_Evaluations: the initial sample of 28 sets is cut to 27"},
-      {{dds, {"Max_No_Evaluations = 500", "Max_No_Evaluations = 10"}}, ""},
+      {"Algorithm_Type = 1 => 2 & Max_No_Evaluations = 500 => 10", ""},
   };
   for (const auto& row : cases) {
     const std::string log = logOf(row.edits);
@@ -243,14 +213,9 @@ TEST_F(SetupReaderTest, WarnsOfSearchSettingsThatEndASearchEarly) {
 
 TEST_F(SetupReaderTest, TheSetupIsLookedForWhereItsNameSays) {
   RunLog log;
-  try {
-    readSetupFile(folder_ + "/none.kdx  ", log);
-    ADD_FAILURE() << "read a file that does not exist";
-  } catch (const FatalError& error) {
-    EXPECT_EQ(error.message(), "Error: Unable to open " + folder_ + "/none.kdx");
-    EXPECT_EQ(error.detail(), "No such file or directory");
-  }
-  write("my.setup.KDX", edited({}));
+  EXPECT_EQ(withoutFolder(refusalOf([&] { readSetupFile(folder_ + "/none.kdx  ", log); })),
+            "Error: Unable to open none.kdx\nNo such file or directory");
+  write("my.setup.KDX", edited(""));
   EXPECT_EQ(readSetupFile(folder_ + "/model/../my.setup.KDX", log).setupName, "my.setup");
 }
 

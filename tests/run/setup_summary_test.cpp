@@ -10,7 +10,7 @@ namespace {
 using SetupSummaryTest = SetupFixture;
 
 TEST_F(SetupSummaryTest, SaysWhatTheRunIsAboutToDo) {
-  RunConfig config = read({{"Weight = 0.75", "Weight = 0.75\nStandard_Deviation = 2.5"}});
+  RunConfig config = read("Weight = 0.75 => Weight = 0.75\nStandard_Deviation = 2.5");
   config.baseFolder = "/base";
   SearchSpace space;
   space.names = {"Depth", "Rate"};

@@ -7,7 +7,7 @@
 #include <gtest/gtest.h>
 
 #include "algorithms/optimisation_driver.h"
-#include "common/fatal_error.h"
+#include "refusal.h"
 
 namespace mirevo {
 namespace {
@@ -85,13 +85,9 @@ TEST_F(TasksTest, MultipleRunsAreOneBatchAndComeBackToTheirModelValues) {
 TEST_F(TasksTest, AScenarioValueWithoutALogarithmIsRefusedByRunAndParameter) {
   config_.scenario.scenarioType = 1;
   config_.scenario.runs = {{1.0, 1.0, 1.0, 1.0}, {1.0, 1.0, 0.0, 1.0}};
-  try {
-    run();
-    FAIL() << "accepted";
-  } catch (const FatalError& error) {
-    EXPECT_EQ(error.message(), "Error: Invalid parameter transformation for parameter c");
-    EXPECT_EQ(error.detail(), "Scenario run 2 has the value 0, which has no logarithm.");
-  }
+  EXPECT_EQ(refusalOf([this] { run(); }),
+            "Error: Invalid parameter transformation for parameter c\n"
+            "Scenario run 2 has the value 0, which has no logarithm.");
   EXPECT_TRUE(evaluator_.batches.empty());
 }
 
@@ -169,12 +165,7 @@ TEST(RunSearch, AnyStepThatFailsIsFatalWithItsAlgorithmsText) {
                                      {"PSE", "Error: Invalid operation in PSE algorithm"},
                                      {"DDS", "Error: Invalid operation in DDS algorithm"}}) {
       FailingSearch search(goodSteps);
-      try {
-        runSearch(search, name, {});
-        FAIL() << "went on";
-      } catch (const FatalError& error) {
-        EXPECT_EQ(error.message(), text);
-      }
+      EXPECT_EQ(refusalMessageOf([&, &algorithm = name] { runSearch(search, algorithm, {}); }), text);
     }
   }
 }
