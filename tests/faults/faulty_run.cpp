@@ -69,10 +69,7 @@ FaultyRun::FaultyRun(RunSettings settings, bool restarts, const std::string& mod
   folder_.write("model/data/table.txt", std::string(20'000, 'x'));
   fs::create_symlink("data/table.txt", folder_ / "model/link");
   folder_.writeSetup(settings);
-  if (restarts) {
-    std::string text = folder_.read("basin.kdx");
-    folder_.write("basin.kdx", text.insert(text.find("    Title = "), "    Restart = 1\n"));
-  }
+  if (restarts) folder_.editSetup("    Title = ", "    Restart = 1\n    Title = ");
   resultFileName_ = settings.option == 2   ? "basin_Optimisation.dat"
                     : settings.option == 1 ? "basin_Sensitivity.dat"
                                            : "basin.dat";

@@ -33,13 +33,6 @@ std::vector<double> reportRow(const ResultTable& results, const std::string& tab
   return {};
 }
 
-void replaceInSetup(const ModelFolder& folder, const std::string& from, const std::string& to) {
-  std::string text = folder.read("basin.kdx");
-  const auto at = text.find(from);
-  ASSERT_NE(at, std::string::npos) << from;
-  folder.write("basin.kdx", text.replace(at, from.size(), to));
-}
-
 TEST(LocalSensitivity, OfALinearModelGivesTheCovarianceOfItsClosedForm) {
   const ModelFolder folder;
   const ProgramResult run = runProgram({folder.writeSetup({.option = 1})});
@@ -101,9 +94,9 @@ exec awk '
   }' parameters.txt >simulated.csv
 )");
   folder.writeSetup({.option = 1});
-  replaceInSetup(folder, "Initial_Value = 4.0", "Initial_Value = 2.3894212918E+02");
-  replaceInSetup(folder, "Upper_Bound = 10.0", "Upper_Bound = 1000.0");
-  replaceInSetup(folder, "Initial_Value = 1.0", "Initial_Value = 5.5015643181E-04");
+  folder.editSetup("Initial_Value = 4.0", "Initial_Value = 2.3894212918E+02");
+  folder.editSetup("Upper_Bound = 10.0", "Upper_Bound = 1000.0");
+  folder.editSetup("Initial_Value = 1.0", "Initial_Value = 5.5015643181E-04");
   const ProgramResult run = runProgram({(folder / "basin.kdx")});
   ASSERT_EQ(run.exitCode, 0) << run.error;
   const ResultTable results = readResults(folder.read("basin_Sensitivity.dat"));

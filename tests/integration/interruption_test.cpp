@@ -92,15 +92,6 @@ TEST_F(Interruption, ASignalEndsTheRunWithItsMessageAndNothingIsLeft) {
   }
 }
 
-TEST_F(Interruption, AKilledRunLeavesNoModelBehind) {
-  RunningProgram program({setup_});
-  const int grandchild = waitForGrandchild();
-  program.send(SIGKILL);
-  EXPECT_EQ(program.wait(5.0).signal, SIGKILL);
-  expectFirstRowIsThere();
-  expectGone(grandchild);
-}
-
 TEST_F(Interruption, ASetupThatIsBeingRunIsNotRunASecondTime) {
   RunningProgram program({setup_});
   waitForGrandchild();

@@ -48,178 +48,36 @@ class ModelFolder : public TemporaryFolder {
 
   /// Writes `basin.kdx` and returns its path.
   std::string writeSetup(const RunSettings& settings) const { return write("basin.kdx", setupText(settings)); }
+  /// Replaces a text in `basin.kdx`, which must hold it.
+  void editSetup(const std::string& from, const std::string& to) const {
+    std::string text = read("basin.kdx");
+    const auto at = text.find(from);
+    ASSERT_NE(at, std::string::npos) << from;
+    write("basin.kdx", text.replace(at, from.size(), to));
+  }
 
  private:
-  static std::string scenarioText(const RunSettings& settings) {
-    std::string items;
-    for (std::size_t i = 0; i < settings.scenarios.size(); ++i) {
-      items += fmt::format("      [SCENARIO_{0}]\n        Parameters = {1}\n      [/SCENARIO_{0}]\n", i + 1,
-                           settings.scenarios[i]);
-    }
-    return fmt::format(R"(  [SCENARIOS]
-    Scenario_Type = {}
-    [SCENARIO_RUNS]
-      TqSEKdxListItemCount = {}
-{}    [/SCENARIO_RUNS]
-  [/SCENARIOS]
-)",
-                       settings.scenarios.empty() ? 0 : 1, settings.scenarios.size(), items);
-  }
-
-  static std::string savedText(const RunSettings& settings) {
-    const std::string item =
-        fmt::format("    [OUTPUT_FILE_1]\n      File_name = '{}'\n    [/OUTPUT_FILE_1]\n", settings.savedFile);
-    return fmt::format("  [SAVE_OUTPUT_FILES]\n    TqSEKdxListItemCount = {}\n{}  [/SAVE_OUTPUT_FILES]\n",
-                       settings.savedFile.empty() ? 0 : 1, settings.savedFile.empty() ? "" : item);
-  }
-
-  static std::string parameterText(int number, const char* name, double initial, double upper, int type) {
-    return fmt::format(R"(    [PARAMETER_{0}]
-      Initial_Value = {2:.1f}
-      Lower_Bound = 0.0
-      Upper_Bound = {3:.1f}
-      Transformation_Type = 0
-      Parameter_Type = {4}
-      Parameter_IDValue = {0}.5E-035
-      Parameter_Name = '{1}'
-      Parameter_Equation = ''
-      Comment = ''
-      [Keywords]
-      [/Keywords]
-    [/PARAMETER_{0}]
-)",
-                       number, name, initial, upper, type);
-  }
-
+  /// tests/integration/basin.kdx, where the fields stand in braces by their names here.
   static std::string setupText(const RunSettings& settings) {
-    std::string text = fmt::format(R"([MIREVO_PARAMETERS]
-  [MIREVO_SIMULATION_OPTION]
-    Option = {}
-    Title = 'Small test basin'
-    [SIMBATCH]
-      TqSEKdxListItemCount = 1
-      [SIMBATCHITEM_1]
-        BatchFileName = '{}'
-        Arguments = '{}'
-      [/SIMBATCHITEM_1]
-    [/SIMBATCH]
-    [SIMPARAM]
-      TqSEKdxListItemCount = 1
-      [SIMPARAMITEM_1]
-        FileType = 0
-        ParamFileName = 'model/parameters.txt'
-        TemplateFileName = '{}'
-      [/SIMPARAMITEM_1]
-    [/SIMPARAM]
-  [/MIREVO_SIMULATION_OPTION]
-)",
-                                   settings.option, settings.batchFile, settings.modelArguments, settings.templateFile);
-    text += "  [MODEL_PARAMETERS]\n    TqSEKdxListItemCount = 3\n" + parameterText(1, "a", 4.0, 10.0, 0) +
-            parameterText(2, "b", 1.0, 5.0, 0) + parameterText(3, "c", 1.0, 5.0, 1);
-    text += fmt::format(R"(    [INTERNAL_CONSTRAINTS]
-      TqSEKdxListItemCount = 0
-    [/INTERNAL_CONSTRAINTS]
-  [/MODEL_PARAMETERS]
-  [ObjectiveFunctions]
-    Start_Date = 2001-01-01
-    End_Date = 2001-12-31
-    Aggregation_Method = 0
-    [OUTPUT_MEASURES]
-      TqSEKdxListItemCount = 1
-      [MEASURE_1]
-        Name = 'flow'
-        Interface_Type = 0
-        MeasurementNo = 1
-        Statistic_Type = 1
-        Weight = 1.0
-        Weight_Above = 1.0
-        Function_Name = 'fit'
-        [SIMULATION_FILE]
-          File_Name = '{}'
-          Item_No = 1
-        [/SIMULATION_FILE]
-        [OBSERVATION_FILE]
-          File_Name = '{}'
-          Item_No = 1
-        [/OBSERVATION_FILE]
-      [/MEASURE_1]
-      [OUTPUT_MEASURE_FILE]
-        File_Name = ''
-      [/OUTPUT_MEASURE_FILE]
-    [/OUTPUT_MEASURES]
-    [OBJECTIVE_FUNCTIONS]
-      TqSEKdxListItemCount = 1
-      [OBJECTIVE_1]
-        Name = 'fit'
-        Function_Type = 0
-        Weight = 1.0
-      [/OBJECTIVE_1]
-    [/OBJECTIVE_FUNCTIONS]
-  [/ObjectiveFunctions]
-)",
-                        settings.simulationFile, settings.observationFile);
-    text += savedText(settings);
-    text += scenarioText(settings);
-    text +=
-        fmt::format(R"(  [SENSITIVITY_ANALYSIS]
-    Sensitivity_Type = 0
-    [LOCAL_SA]
-      Differencing = 1
-      Perturbation_Option = 1
-      Perturbation_Fraction = 0.005
-      Calculate_Covmatrix = 1
-    [/LOCAL_SA]
-  [/SENSITIVITY_ANALYSIS]
-  [OPTIMISATION_ALGORITHM]
-    Algorithm_Type = {4}
-    Use_Surrogate_Model = 0
-    [SCE_CONTROL_PARAMETERS]
-      No_Complexes = 2
-      No_Points_Complex = 5
-      No_Points_Subcomplex = 3
-      No_Evaluation_Steps = 5
-    [/SCE_CONTROL_PARAMETERS]
-    [PSE_CONTROL_PARAMETERS]
-      Population_Size = 10
-      No_Points_Simplex = 3
-    [/PSE_CONTROL_PARAMETERS]
-    [DDS_CONTROL_PARAMETERS]
-      Perturbation_Parameter = 0.2
-    [/DDS_CONTROL_PARAMETERS]
-    [INITIAL_SAMPLE]
-      Include_Initial_Parameters = 1
-      Random_Seed = {0}
-      Initial_Sample_Generation = 0
-      Initial_Sample_File_Name = ''
-    [/INITIAL_SAMPLE]
-    [STOPPING_CRITERIA]
-      Max_No_Evaluations = {1}
-      No_Loops_Convergence = 5
-      Min_Change = 0.001
-    [/STOPPING_CRITERIA]
-  [/OPTIMISATION_ALGORITHM]
-  [UNCERTAINTY_ESTIMATION]
-    Uncertainty_Type = 1
-    Sample_Size = {1}
-    Random_Seed = {0}
-    [PARAMETER_1]
-      Mean_Value = 5.0
-      Standard_Deviation = 0.5
-    [/PARAMETER_1]
-    [PARAMETER_2]
-      Mean_Value = 2.0
-      Standard_Deviation = 0.1
-    [/PARAMETER_2]
-  [/UNCERTAINTY_ESTIMATION]
-  [SimultaneousSimulations]
-    NoSimultaneousSim = {2}
-    UseSingleThread = 0
-    ProcessFolder = '{3}'
-  [/SimultaneousSimulations]
-[/MIREVO_PARAMETERS]
-)",
-                    settings.seed, settings.maxEvaluations, settings.slots, settings.processFolder, settings.algorithm);
-    return text;
+    std::ifstream file(MIREVO_SOURCE_DIR "/tests/integration/basin.kdx");
+    const std::string form(std::istreambuf_iterator<char>(file), {});
+    std::string scenarios;
+    for (std::size_t i = 0; i < settings.scenarios.size(); ++i) {
+      scenarios += fmt::format("      [SCENARIO_{0}]\n        Parameters = {1}\n      [/SCENARIO_{0}]\n", i + 1,
+                               settings.scenarios[i]);
+    }
+    const bool saves = !settings.savedFile.empty();
+    const std::string savedFiles =
+        fmt::format("    [OUTPUT_FILE_1]\n      File_name = '{}'\n    [/OUTPUT_FILE_1]\n", settings.savedFile);
+    return fmt::format(
+        fmt::runtime(form), fmt::arg("option", settings.option), fmt::arg("algorithm", settings.algorithm),
+        fmt::arg("maxEvaluations", settings.maxEvaluations), fmt::arg("seed", settings.seed),
+        fmt::arg("slots", settings.slots), fmt::arg("modelArguments", settings.modelArguments),
+        fmt::arg("batchFile", settings.batchFile), fmt::arg("templateFile", settings.templateFile),
+        fmt::arg("simulationFile", settings.simulationFile), fmt::arg("observationFile", settings.observationFile),
+        fmt::arg("processFolder", settings.processFolder), fmt::arg("savedCount", saves ? 1 : 0),
+        fmt::arg("savedFiles", saves ? savedFiles : ""), fmt::arg("scenarioType", scenarios.empty() ? 0 : 1),
+        fmt::arg("scenarioCount", settings.scenarios.size()), fmt::arg("scenarios", scenarios));
   }
 };
 

@@ -5,6 +5,7 @@
 #include <gtest/gtest.h>
 
 #include "integration/model_folder.h"
+#include "integration/mpi_job.h"
 
 namespace mirevo::testing {
 namespace {
@@ -22,27 +23,14 @@ int occurrences(const std::string& text, const std::string& wanted) {
   return count;
 }
 
-/// Jobs of the built program on this machine alone, more processes than cores.
 class Mpi : public ::testing::Test {
  protected:
   void SetUp() override {
-    if (std::system("mpirun --version >/dev/null 2>&1") != 0) GTEST_SKIP() << "mpirun is not installed";
+    if (!mpirunIsInstalled()) GTEST_SKIP() << "mpirun is not installed";
   }
 
-  static std::vector<std::string> command(int processes, const std::vector<std::string>& arguments) {
-    std::vector<std::string> words{"--oversubscribe",         "--allow-run-as-root", "--bind-to", "none", "-n",
-                                   std::to_string(processes), MIREVO_PROGRAM};
-    words.insert(words.end(), arguments.begin(), arguments.end());
-    return words;
-  }
-  static RunningProgram::Environment environment() {
-    // Shared memory only. What MPI itself does not release at its end is no fault of the program.
-    return {{"OMPI_MCA_btl", "self,vader"},
-            {"OMPI_MCA_btl_vader_single_copy_mechanism", "none"},
-            {"ASAN_OPTIONS", "detect_leaks=0"}};
-  }
   static ProgramResult runJob(int processes, const std::vector<std::string>& arguments) {
-    return RunningProgram(command(processes, arguments), environment(), "mpirun").wait();
+    return RunningProgram(mpirunArguments(processes, arguments), mpirunEnvironment(), "mpirun").wait();
   }
 
   /// The model as a shell script with `lines` before the model proper.
@@ -229,7 +217,7 @@ class HangingMpi : public Mpi {
 
   /// mpirun gives the ranks so many seconds between SIGTERM and SIGKILL; its own one is short for a busy machine.
   static RunningProgram::Environment patientEnvironment() {
-    RunningProgram::Environment variables = environment();
+    RunningProgram::Environment variables = mpirunEnvironment();
     variables["OMPI_MCA_odls_base_sigkill_timeout"] = "3";
     return variables;
   }
@@ -241,7 +229,7 @@ class HangingMpi : public Mpi {
 };
 
 TEST_F(HangingMpi, AKillFileStopsEveryRankInFiveSeconds) {
-  RunningProgram job(command(3, {setup_}), environment(), "mpirun");
+  RunningProgram job(mpirunArguments(3, {setup_}), mpirunEnvironment(), "mpirun");
   waitUntilOneIsLeft();
   const auto start = std::chrono::steady_clock::now();
   folder_.write("basin._kill_", "");
@@ -256,27 +244,20 @@ TEST_F(HangingMpi, AKillFileStopsEveryRankInFiveSeconds) {
   expectAllGone();
 }
 
-TEST_F(HangingMpi, ATerminatedLauncherLeavesNoProcess) {
-  RunningProgram job(command(3, {setup_}), patientEnvironment(), "mpirun");
-  waitUntilOneIsLeft();
-  job.send(SIGTERM);
-  const ProgramResult result = job.wait(20.0);
-  EXPECT_FALSE(result.timedOut);
-  EXPECT_NE(result.exitCode, 0);
-  EXPECT_THAT(log(), HasSubstr("\nTermination request\n"));
-  expectAllGone();
-}
-
-TEST_F(HangingMpi, AKilledWorkerEndsTheJob) {
-  RunningProgram job(command(3, {setup_}), patientEnvironment(), "mpirun");
-  waitUntilOneIsLeft();
-  ::kill(worker_, SIGKILL);
-  const ProgramResult result = job.wait(20.0);
-  EXPECT_FALSE(result.timedOut);
-  EXPECT_NE(result.exitCode, 0);
-  EXPECT_THAT(result.error, HasSubstr("signal 9"));
-  EXPECT_THAT(log(), HasSubstr("\nTermination request\n"));
-  expectAllGone();
+TEST_F(HangingMpi, ATerminatedLauncherOrAKilledWorkerEndsTheJobAndLeavesNoProcess) {
+  for (const bool killsWorker : {false, true}) {
+    std::filesystem::remove(folder_ / "first");
+    for (const char* name : {"model.pid", "worker.pid", "grandchild.pid"}) std::filesystem::remove(folder_ / name);
+    RunningProgram job(mpirunArguments(3, {setup_}), patientEnvironment(), "mpirun");
+    waitUntilOneIsLeft();
+    killsWorker ? static_cast<void>(::kill(worker_, SIGKILL)) : job.send(SIGTERM);
+    const ProgramResult result = job.wait(20.0);
+    EXPECT_FALSE(result.timedOut);
+    EXPECT_NE(result.exitCode, 0);
+    EXPECT_THAT(log(), HasSubstr("\nTermination request\n"));
+    EXPECT_THAT(result.error, HasSubstr(killsWorker ? "signal 9" : ""));
+    expectAllGone();
+  }
 }
 
 }  // namespace

@@ -134,15 +134,15 @@ TEST(Report, OfARunThatGoesOnOrWasCutOffSaysSoAndLeavesItsFilesAlone) {
 TEST(Report, IsLeftOutWhereTheSetupSaysSoAndNeverFailsTheRun) {
   const ModelFolder folder;
   folder.writeSetup({.option = 0});
-  std::string setup = folder.read("basin.kdx");
-  setup.insert(setup.find("    Title = "), "    Report = 0\n");
-  folder.write("silent.kdx", setup);
+  folder.editSetup("    Title = ", "    Report = 0\n    Title = ");
+  folder.write("silent.kdx", folder.read("basin.kdx"));
   EXPECT_EQ(runProgram({folder / "silent.kdx"}).exitCode, 0);
   EXPECT_FALSE(folder.exists("silent_Report.html"));
   EXPECT_TRUE(folder.exists("silent_Series.dat"));
   EXPECT_EQ(makeReport(folder, "silent.kdx").exitCode, 0);
   EXPECT_TRUE(folder.exists("silent_Report.html"));
 
+  folder.editSetup("    Report = 0\n", "");
   std::filesystem::create_directories(folder / "basin_Report.html.tmp/in the way");
   EXPECT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0);
   EXPECT_THAT(folder.read("basin.log"),
@@ -152,15 +152,9 @@ TEST(Report, IsLeftOutWhereTheSetupSaysSoAndNeverFailsTheRun) {
 TEST(Report, HoldsWhateverNamesTheSetupHas) {
   const ModelFolder folder;
   folder.writeSetup({.option = 0});
-  std::string setup = folder.read("basin.kdx");
-  const auto replace = [&setup](const std::string& from, const std::string& to) {
-    for (auto at = setup.find(from); at != std::string::npos; at = setup.find(from, at + to.size()))
-      setup.replace(at, from.size(), to);
-  };
-  replace("'Small test basin'", "'</script><script>alert(1)</script> \xFC @REPORT_DATA@'");
-  replace("Name = 'flow'", "Name = '<b>\"#" + std::string(200, 'x') + "'");
-  replace("'fit'", "'f </script>'");
-  folder.write("basin.kdx", setup);
+  folder.editSetup("'Small test basin'", "'</script><script>alert(1)</script> \xFC @REPORT_DATA@'");
+  folder.editSetup("Name = 'flow'", "Name = '<b>\"#" + std::string(200, 'x') + "'");
+  for (int i = 0; i < 2; ++i) folder.editSetup("'fit'", "'f </script>'");
   EXPECT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0) << folder.read("basin.log");
   const std::string page = folder.read("basin_Report.html");
   EXPECT_THAT(page,

@@ -8,6 +8,7 @@
 #include <gtest/gtest.h>
 
 #include "integration/model_folder.h"
+#include "integration/mpi_job.h"
 
 namespace mirevo::testing {
 namespace {
@@ -54,17 +55,11 @@ class Restart : public ::testing::Test {
   /// Writes a setup that goes on with what it finds.
   void writeSetup(const RunSettings& settings, const Edits& edits = {}) {
     setup_ = folder_.writeSetup(settings);
-    edit("    Title = ", "    Restart = 1\n    Title = ");
-    for (const auto& [from, to] : edits) edit(from, to);
+    folder_.editSetup("    Title = ", "    Restart = 1\n    Title = ");
+    for (const auto& [from, to] : edits) folder_.editSetup(from, to);
     resultFile_ = settings.option == 2   ? "basin_Optimisation.dat"
                   : settings.option == 1 ? "basin_Sensitivity.dat"
                                          : "basin.dat";
-  }
-  void edit(const std::string& from, const std::string& to) const {
-    std::string text = folder_.read("basin.kdx");
-    const auto at = text.find(from);
-    ASSERT_NE(at, std::string::npos) << from;
-    folder_.write("basin.kdx", text.replace(at, from.size(), to));
   }
   void removeResults() const {
     for (const auto& entry : std::filesystem::directory_iterator(folder_.path())) {
@@ -82,13 +77,7 @@ class Restart : public ::testing::Test {
   }
   std::unique_ptr<RunningProgram> start(int processes) const {
     if (processes == 0) return std::make_unique<RunningProgram>(std::vector{setup_});
-    const RunningProgram::Environment environment{{"OMPI_MCA_btl", "self,vader"},
-                                                  {"OMPI_MCA_btl_vader_single_copy_mechanism", "none"},
-                                                  {"ASAN_OPTIONS", "detect_leaks=0"}};
-    return std::make_unique<RunningProgram>(
-        std::vector<std::string>{"--oversubscribe", "--allow-run-as-root", "--bind-to", "none", "-n",
-                                 std::to_string(processes), MIREVO_PROGRAM, setup_},
-        environment, "mpirun");
+    return std::make_unique<RunningProgram>(mpirunArguments(processes, {setup_}), mpirunEnvironment(), "mpirun");
   }
   /// Kills a run after that time, without a chance to put anything in order.
   void runAndKill(int processes, double seconds) const {
@@ -136,7 +125,7 @@ class KilledRuns : public Restart, public ::testing::WithParamInterface<KilledRu
 
 TEST_P(KilledRuns, EndLikeOneThatWasNot) {
   const KilledRun& param = GetParam();
-  if (param.processes > 0 && std::system("mpirun --version >/dev/null 2>&1") != 0) GTEST_SKIP() << "no mpirun";
+  if (param.processes > 0 && !mpirunIsInstalled()) GTEST_SKIP() << "no mpirun";
   writeSetup(param.settings, param.edits);
   const auto began = std::chrono::steady_clock::now();
   run(param.processes);
@@ -184,7 +173,7 @@ INSTANTIATE_TEST_SUITE_P(Restart, KilledRuns, ::testing::ValuesIn(kKilledRuns),
                          [](const auto& test) { return std::string(test.param.name); });
 
 TEST_F(Restart, ARunOfOneKindIsTakenUpByAnother) {
-  if (std::system("mpirun --version >/dev/null 2>&1") != 0) GTEST_SKIP() << "no mpirun";
+  if (!mpirunIsInstalled()) GTEST_SKIP() << "no mpirun";
   writeSetup({.maxEvaluations = 60, .slots = 3, .modelArguments = "--sleep-ms 10"}, {{kDds, kPseWithSurrogate}});
   run();
   const std::string expected = results();
@@ -222,7 +211,7 @@ TEST_F(Restart, AFinishedRunIsWalkedThroughAndEndsWithTheSameFile) {
                                                      "run: OK\nPROGRE100.0\n"));
   EXPECT_FALSE(folder_.exists("basin.1.dat"));
   EXPECT_FALSE(folder_.exists("basin_Band_1.1.csv"));
-  edit("Restart = 1", "Restart = 0");
+  folder_.editSetup("Restart = 1", "Restart = 0");
   run();
   EXPECT_TRUE(folder_.exists("basin.1.dat"));
   EXPECT_EQ(results(), expected);
@@ -232,9 +221,9 @@ TEST_F(Restart, AChangedSettingIsRefusedByName) {
   writeSetup({.maxEvaluations = 10});
   run();
   const std::string before = folder_.read(resultFile_);
-  edit("Upper_Bound = 10.0", "Upper_Bound = 9.0");
-  edit("Random_Seed = 1", "Random_Seed = 2");
-  edit("Small test basin", "Another title");
+  folder_.editSetup("Upper_Bound = 10.0", "Upper_Bound = 9.0");
+  folder_.editSetup("Random_Seed = 1", "Random_Seed = 2");
+  folder_.editSetup("Small test basin", "Another title");
   run(0, 1);
   EXPECT_THAT(log(), HasSubstr("   Upper_Bound of PARAMETER_1 (a): 10 then, 9 now\n"
                                "   Random_Seed of OPTIMISATION_ALGORITHM/INITIAL_SAMPLE: 1 then, 2 now\n"
@@ -247,7 +236,7 @@ TEST_F(Restart, ARaisedBudgetTakesAFinishedSearchFurther) {
   for (const char* search : {kSce, kPseWithSurrogate}) {
     writeSetup({.maxEvaluations = 40}, {{kDds, search}});
     run();
-    edit("Max_No_Evaluations = 40", "Max_No_Evaluations = 70");
+    folder_.editSetup("Max_No_Evaluations = 40", "Max_No_Evaluations = 70");
     run();
     const std::string taken = results();
     removeResults();
@@ -261,7 +250,7 @@ TEST_F(Restart, ARaisedBudgetIsANewSearchOfDds) {
   writeSetup({.maxEvaluations = 20}, {kFromRandomPoints});
   run();
   const ResultTable first = readResults(folder_.read(resultFile_));
-  edit("Max_No_Evaluations = 20", "Max_No_Evaluations = 50");
+  folder_.editSetup("Max_No_Evaluations = 20", "Max_No_Evaluations = 50");
   const auto checkFirstRows = [&] {
     const ResultTable table = readResults(folder_.read(resultFile_));
     ASSERT_GE(table.rows.size(), first.rows.size());
@@ -280,7 +269,7 @@ TEST_F(Restart, ARaisedBudgetIsANewSearchOfDds) {
 
 TEST_F(Restart, FailuresThatEndedARunAreMadeAgainWhenAsked) {
   writeSetup({.option = 0, .scenarios = scenarios(30)});
-  edit("  [SimultaneousSimulations]\n", "  [SimultaneousSimulations]\n    MaxSimulationTime = 0.2\n");
+  folder_.editSetup("  [SimultaneousSimulations]\n", "  [SimultaneousSimulations]\n    MaxSimulationTime = 0.2\n");
   const std::string script = folder_.read("model/run.sh");
   folder_.write("model/run.sh", "#!/bin/sh\ntest -e ../fast || test ! -e second || sleep 60\ntouch second\n" +
                                     script.substr(script.find("exec")));
@@ -295,7 +284,7 @@ TEST_F(Restart, FailuresThatEndedARunAreMadeAgainWhenAsked) {
   folder_.write("fast", "");
   run(0, 1);  // the same failures, so the same end
   EXPECT_THAT(log(), HasSubstr("   4 x batch ran too long; first No. 2: run.sh was ended because"));
-  edit("Restart = 1", "Restart = 2");
+  folder_.editSetup("Restart = 1", "Restart = 2");
   run();
   EXPECT_EQ(readResults(results()).rows.size(), 31U);
   EXPECT_THAT(results(), Not(HasSubstr("FAILED")));
