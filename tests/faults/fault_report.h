@@ -11,8 +11,11 @@ namespace mirevo::testing {
 /// What was tried and what of it went wrong.
 class FaultReport {
  public:
-  /// One fault of a kind was tried; `problems` is what was wrong with how the program took it, empty when nothing was.
-  void tried(const std::string& kind, const std::string& fault, const std::vector<std::string>& problems) {
+  /// One fault of a kind was tried; `problems` is what was wrong with how the program took it, empty when nothing was,
+  /// and `later` with what came after it.
+  void tried(const std::string& kind, const std::string& fault, std::vector<std::string> problems,
+             const std::vector<std::string>& later = {}) {
+    problems.insert(problems.end(), later.begin(), later.end());
     ++tried_[kind];
     if (problems.empty()) return;
     ++failedCount_;

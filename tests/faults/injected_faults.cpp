@@ -212,14 +212,12 @@ void tryInjectedFaults(bool isLong, FaultReport& report) {
       std::filesystem::remove(records / "trial");
       const ProgramResult result = run.run(injection(run, fault.text(), records / "trial"));
       if (records.read("trial").find("failed\t") == std::string::npos) continue;  // another slot took that run
-      std::vector<std::string> problems = run.check(result, expectationOf(fault, run));
-      const auto later = run.checkNextRun();
-      problems.insert(problems.end(), later.begin(), later.end());
+      const std::vector<std::string> problems = run.check(result, expectationOf(fault, run));
       report.tried(
           kindOf(fault.call.second),
           fmt::format("{} {}: {} {}, call {} ({}): {}", isRestart ? "restart of option" : "option", setting.option,
                       fault.call.first, fault.call.second, fault.number, fault.how, std::strerror(fault.error)),
-          problems);
+          problems, run.checkNextRun());
     }
   }
 }

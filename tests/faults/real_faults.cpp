@@ -84,9 +84,8 @@ void tryForbiddenFiles(FaultReport& report) {
                                        .logMayLackMessage = forbidden.isBeforeLog});
     if (result.exitCode != 1) problems.push_back(fmt::format("exit code {}", result.exitCode));
     ::chmod(path.c_str(), before.st_mode & 07777);
-    const auto later = run.checkNextRun();
-    problems.insert(problems.end(), later.begin(), later.end());
-    report.tried("forbidden files", fmt::format("{} with mode {:o}", forbidden.path, forbidden.mode), problems);
+    report.tried("forbidden files", fmt::format("{} with mode {:o}", forbidden.path, forbidden.mode), problems,
+                 run.checkNextRun());
   }
 }
 
@@ -103,11 +102,9 @@ void tryLimit(FaultReport& report, const std::string& kind, const char* option, 
     if (isNobody) giveToNobody(run);
     const ProgramResult result = run.run({}, prefix);
     if (result.exitCode > 1) continue;  // too little to load the program
-    auto problems = run.check(result, expected);
-    const auto later = run.checkNextRun();
-    problems.insert(problems.end(), later.begin(), later.end());
-    report.tried(kind, command, problems);
+    const auto problems = run.check(result, expected);
     undisturbed = result.exitCode == 0 && run.checkOutputs().empty() ? undisturbed + 1 : 0;
+    report.tried(kind, command, problems, run.checkNextRun());
   }
 }
 
@@ -186,16 +183,14 @@ void tryFullDisk(bool isLong, FaultReport& report) {
         const ProgramResult result = run->run({});
         disk.leave(-1, -1);
         // The log is on the same disk; a model that cannot write says so in its own words.
-        auto problems = run->check(result, {.names = {"No space left on device", "cannot write"},
-                                            .mayPassSilently = true,
-                                            .mayFailEvaluation = true,
-                                            .logMayLackMessage = result.exitCode == 1,
-                                            .resultFileFails = true});
+        const auto problems = run->check(result, {.names = {"No space left on device", "cannot write"},
+                                                  .mayPassSilently = true,
+                                                  .mayFailEvaluation = true,
+                                                  .logMayLackMessage = result.exitCode == 1,
+                                                  .resultFileFails = true});
         undisturbed = result.exitCode == 0 && run->checkOutputs().empty() ? undisturbed + 1 : 0;
-        const auto later = run->checkNextRun();
-        problems.insert(problems.end(), later.begin(), later.end());
         report.tried("full disk", fmt::format("option {}, room for {} {}", option, room, isFiles ? "files" : "blocks"),
-                     problems);
+                     problems, run->checkNextRun());
       }
     }
   }

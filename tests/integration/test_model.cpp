@@ -30,6 +30,7 @@
 // A parameter file that cannot be read, or an unknown option, ends it with code 2 and a message on standard error.
 #include <algorithm>
 #include <array>
+#include <chrono>
 #include <cmath>
 #include <csignal>
 #include <cstdio>
@@ -126,26 +127,17 @@ void sleepMilliseconds(double milliseconds) {
 std::string results(const Settings& settings, double a, double b, double c) {
   const int steps = static_cast<int>(number(settings, "steps", 365));
   const std::string how = text(settings, "write", "all");
-  static constexpr std::array<int, 12> kDays = {31, 28, 31, 30, 31, 30, 31, 31, 30, 31, 30, 31};
-  int year = 2001;
-  int month = 1;
-  int day = 1;
   std::string csv = "time,simulated\n";
   const int written = how == "empty" ? 0 : how == "half" ? steps / 2 : steps;
   for (int t = 0; t < written; ++t) {
     const double value = how == "nan" ? NAN : a + b * std::sin(t / 58.0) + c * t / 365.0;
     std::array<char, 80> line{};
-    std::snprintf(line.data(), line.size(), how == "nan" ? "%04d-%02d-%02d,NaN\n" : "%04d-%02d-%02d,%.9g\n", year,
-                  month, day, value);
+    const std::chrono::year_month_day day =
+        std::chrono::sys_days(std::chrono::January / 1 / 2001) + std::chrono::days(t);
+    std::snprintf(line.data(), line.size(), how == "nan" ? "%04d-%02u-%02u,NaN\n" : "%04d-%02u-%02u,%.9g\n",
+                  static_cast<int>(day.year()), static_cast<unsigned>(day.month()), static_cast<unsigned>(day.day()),
+                  value);
     csv += line.data();
-    const bool leap = (year % 4 == 0 && year % 100 != 0) || year % 400 == 0;
-    if (++day > kDays[static_cast<std::size_t>(month - 1)] + (month == 2 && leap ? 1 : 0)) {
-      day = 1;
-      if (++month > 12) {
-        month = 1;
-        ++year;
-      }
-    }
   }
   if (how == "half" && csv.size() > 20) csv.resize(csv.size() - 8);
   return csv;

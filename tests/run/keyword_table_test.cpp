@@ -33,17 +33,10 @@ TEST(KeywordTable, IsSound) {
 TEST(KeywordTable, DefaultsAreThoseOfTheSettings) {
   RunConfig config;
   const RunConfig untouched;
-  const auto storeDefault = [&config](std::string_view section, std::string_view keyword) {
-    const KeywordRow* row = findKeyword(section, keyword);
-    row->store(config, 0, defaultSetupValue(*row));
-  };
-  storeDefault("OPTIMISATION_ALGORITHM/DDS_CONTROL_PARAMETERS", "Perturbation_Parameter");
-  storeDefault("OPTIMISATION_ALGORITHM/PSE_CONTROL_PARAMETERS", "Prob_Reflection");
-  storeDefault("OPTIMISATION_ALGORITHM/PSE_CONTROL_PARAMETERS", "Prob_Contraction");
-  storeDefault("OPTIMISATION_ALGORITHM/STOPPING_CRITERIA", "No_Loops_Convergence");
-  storeDefault("OPTIMISATION_ALGORITHM/STOPPING_CRITERIA", "Min_Change");
-  storeDefault("OPTIMISATION_ALGORITHM/SURROGATE_MODEL_PARAMETERS", "Neighbourhood_Size");
-  storeDefault("OPTIMISATION_ALGORITHM/INITIAL_SAMPLE", "Initial_Sample_Generation");
+  for (const KeywordRow& row : keywordTable()) {
+    const bool isOfSearch = row.section.starts_with("OPTIMISATION_ALGORITHM/");
+    if (isOfSearch && !row.isRequired() && !row.isLeftOutByDefault()) row.store(config, 0, defaultSetupValue(row));
+  }
   const OptimisationConfig& read = config.optimisation;
   const OptimisationConfig& own = untouched.optimisation;
   EXPECT_EQ(read.dds.perturbation, own.dds.perturbation);

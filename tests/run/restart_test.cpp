@@ -56,9 +56,9 @@ TEST_F(RestartSettingsTest, WhatHasChangedIsNamed) {
 TEST_F(RestartSettingsTest, FilesAreHeldAgainstTheirContent) {
   const RunConfig config = read();
   const auto then = parseRestartSettings(formatRestartSettings(restartSettings(config)));
-  write("model/soil.par", "written by every run");
-  write("model/soil.tpl", "!\n!Rate!\n!\n");
-  write("gauge.csv", "time,flow\n");
+  folder_.write("model/soil.par", "written by every run");
+  folder_.write("model/soil.tpl", "!\n!Rate!\n!\n");
+  folder_.write("gauge.csv", "time,flow\n");
   EXPECT_THAT(
       changedSettings(*then, restartSettings(config)),
       ElementsAre("TemplateFileName of MIREVO_SIMULATION_OPTION/SIMPARAM/SIMPARAMITEM_1: the content of model/soil.tpl "
@@ -90,8 +90,8 @@ class EarlierRunTest : public SetupFixture {
   }
   /// The numbers of the rows that a run with `now` goes on from; or the refusal.
   std::string taken(const RunConfig& then, const RunConfig& now, const std::string& rows) {
-    const RestartFiles files = restartFiles(folder_ + "/setup_Optimisation.dat");
-    write("setup_Optimisation.dat", "# Started: then\n" + std::string(kHeader) + rows);
+    const RestartFiles files = restartFiles(folder_ / "setup_Optimisation.dat");
+    folder_.write("setup_Optimisation.dat", "# Started: then\n" + std::string(kHeader) + rows);
     writeRestartSettings(files.settings, then);
     try {
       const auto run = findEarlierRun(files, now, {{"Depth", "Rate"}, {"Flow error", "Written"}, {"Flow"}});
@@ -163,7 +163,7 @@ TEST_F(EarlierRunTest, ARaisedBudgetOfDdsIsAnotherSearch) {
 
 TEST_F(EarlierRunTest, WithoutItsSettingsOrItsHeaderItIsRefused) {
   const RunConfig config = read();
-  const RestartFiles files = restartFiles(folder_ + "/setup_Optimisation.dat");
+  const RestartFiles files = restartFiles(folder_ / "setup_Optimisation.dat");
   const std::string damaged = "Evalu\tStatus\n" + row(1) + row(2);
   const struct {
     std::string results;
@@ -173,8 +173,8 @@ TEST_F(EarlierRunTest, WithoutItsSettingsOrItsHeaderItIsRefused) {
                {std::string(kHeader) + row(1), "# nothing\n", "setup_Optimisation_Restart.dat"},
                {damaged, "", "setup_Optimisation.dat has no header row that can be read"}};
   for (const auto& c : cases) {
-    write("setup_Optimisation.dat", c.results);
-    if (*c.settings != 0) write("setup_Optimisation_Restart.dat", c.settings);
+    folder_.write("setup_Optimisation.dat", c.results);
+    if (*c.settings != 0) folder_.write("setup_Optimisation_Restart.dat", c.settings);
     EXPECT_THAT(withoutFolder(refusalOf([&] { findEarlierRun(files, config, {}); })),
                 HasSubstr(std::string("\n") + c.detail));
   }

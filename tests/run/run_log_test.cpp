@@ -1,31 +1,25 @@
 #include "run/run_log.h"
 
-#include <filesystem>
 #include <unistd.h>
 
 #include <gtest/gtest.h>
 
-#include "common/files.h"
+#include "temporary_folder.h"
 
 namespace mirevo {
 namespace {
 
 class RunLogTest : public testing::Test {
  protected:
-  void SetUp() override {
-    path_ = testing::TempDir() + "run_log_test_" + std::to_string(::getpid()) + ".log";
-    std::filesystem::remove(path_);
-  }
-  void TearDown() override { std::filesystem::remove(path_); }
-  std::string content() const { return readTextFile(path_, reason_).value_or("(unreadable)"); }
+  std::string content() const { return folder_.read("run.log"); }
 
-  std::string path_;
-  mutable std::string reason_;
+  TemporaryFolder folder_;
+  std::string path_ = folder_ / "run.log";
 };
 
 TEST_F(RunLogTest, LinesBeforeOpeningComeFirstAndAnOlderFileIsReplaced) {
   std::string reason;
-  ASSERT_TRUE(writeByUnlinkAndCreate(path_, "an older run\n", 0644, reason)) << reason;
+  folder_.write("run.log", "an older run\n");
   RunLog log;
   log.line("before");
   log.warning("early");

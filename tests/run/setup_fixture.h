@@ -1,15 +1,14 @@
 #pragma once
 
 #include <algorithm>
-#include <filesystem>
 #include <string>
-#include <unistd.h>
 
 #include <gtest/gtest.h>
 
 #include "common/files.h"
 #include "refusal.h"
 #include "run/setup_reader.h"
+#include "temporary_folder.h"
 
 namespace mirevo {
 
@@ -18,21 +17,12 @@ namespace mirevo {
 /// is the value alone ("Option = 2 => 0"), unless it is empty or an assignment itself.
 class SetupFixture : public testing::Test {
  protected:
-  void SetUp() override {
-    folder_ = testing::TempDir() + "setup_" + std::to_string(::getpid());
-    std::filesystem::remove_all(folder_);
-    std::filesystem::create_directories(folder_ + "/model");
-    write("model/run.sh", "#!/bin/sh\n");
-    write("model/soil.par", "0\n");
-    write("model/soil.tpl", "!\n!Depth!\n");
-    write("model/blank.tpl", "   \n!Depth!\n");
-    write("sample.txt", "Depth\tRate\n");
-  }
-  void TearDown() override { std::filesystem::remove_all(folder_); }
-
-  void write(const std::string& name, std::string_view content) const {
-    std::string reason;
-    ASSERT_TRUE(writeByUnlinkAndCreate(folder_ + "/" + name, content, 0644, reason)) << name << ": " << reason;
+  SetupFixture() {
+    folder_.write("model/run.sh", "#!/bin/sh\n");
+    folder_.write("model/soil.par", "0\n");
+    folder_.write("model/soil.tpl", "!\n!Depth!\n");
+    folder_.write("model/blank.tpl", "   \n!Depth!\n");
+    folder_.write("sample.txt", "Depth\tRate\n");
   }
 
   std::string edited(std::string_view edits) const {
@@ -57,7 +47,7 @@ class SetupFixture : public testing::Test {
 
   RunConfig read(std::string_view edits = {}) {
     RunLog log;
-    return readSetup(folder_ + "/setup.kdx", edited(edits), log);
+    return readSetup(folder_ / "setup.kdx", edited(edits), log);
   }
 
   /// The error that reading ends with as refusalOf() tells it, the fixture's folder left out; empty when it is valid.
@@ -67,7 +57,7 @@ class SetupFixture : public testing::Test {
   }
 
   std::string withoutFolder(std::string text) const {
-    const std::string prefix = folder_ + "/";
+    const std::string prefix = folder_.path() + "/";
     for (auto place = text.find(prefix); place != std::string::npos; place = text.find(prefix, place)) {
       text.erase(place, prefix.size());
     }
@@ -77,16 +67,13 @@ class SetupFixture : public testing::Test {
   /// What reading writes to the log, whether it fails or not.
   std::string logOf(std::string_view edits) {
     RunLog log;
-    try {
-      readSetup(folder_ + "/setup.kdx", edited(edits), log);
-    } catch (const FatalError&) {
-    }
+    refusalOf([&] { readSetup(folder_ / "setup.kdx", edited(edits), log); });
     std::string reason;
-    EXPECT_TRUE(log.open(folder_ + "/setup.log", reason)) << reason;
-    return withoutFolder(readTextFile(folder_ + "/setup.log", reason).value_or(reason));
+    EXPECT_TRUE(log.open(folder_ / "setup.log", reason)) << reason;
+    return withoutFolder(folder_.read("setup.log"));
   }
 
-  std::string folder_;
+  TemporaryFolder folder_;
 };
 
 }  // namespace mirevo

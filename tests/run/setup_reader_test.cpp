@@ -15,10 +15,10 @@ using SetupReaderTest = SetupFixture;
 TEST_F(SetupReaderTest, FillsTheConfigurationOfAnOptimisation) {
   const RunConfig config = read();
   EXPECT_EQ(config.setupName, "setup");
-  EXPECT_EQ(config.setupFolder, folder_);
+  EXPECT_EQ(config.setupFolder, folder_.path());
   EXPECT_EQ(config.title, "Upper catchment") << "trailing blanks";
-  EXPECT_EQ(config.batchItems.at(0).batchFileName, folder_ + "/model/run.sh") << "backslash";
-  EXPECT_EQ(config.baseFolder, folder_ + "/model");
+  EXPECT_EQ(config.batchItems.at(0).batchFileName, folder_ / "model/run.sh") << "backslash";
+  EXPECT_EQ(config.baseFolder, folder_ / "model");
   ASSERT_EQ(config.parameters.size(), 3U);
   EXPECT_THAT(config.parameters[0].keyLines, ElementsAre("soil", "depth"));
   EXPECT_EQ(config.parameters[0].transformationType, TransformationType::logarithmic);
@@ -29,11 +29,11 @@ TEST_F(SetupReaderTest, FillsTheConfigurationOfAnOptimisation) {
   EXPECT_EQ(config.period.start, (DateRecord{2001, 1, 31}));
   EXPECT_EQ(config.period.end, (DateRecord{2003, 12, 31, 24})) << "a date between quotes";
   EXPECT_EQ(config.measures.at(0).simulation.itemNo, 2);
-  EXPECT_EQ(config.measures.at(0).observation.fileName, folder_ + "/gauge.csv");
+  EXPECT_EQ(config.measures.at(0).observation.fileName, folder_ / "gauge.csv");
   EXPECT_EQ(config.measures.at(1).measurementNo, 3);
   EXPECT_THAT(config.objectives.at(0).measures, ElementsAre(0U));
   EXPECT_FALSE(config.objectives[0].standardDeviation.has_value());
-  EXPECT_EQ(config.measureFile, folder_ + "/model/measures.txt");
+  EXPECT_EQ(config.measureFile, folder_ / "model/measures.txt");
   EXPECT_EQ(config.optimisation.pse.populationSize, 20);
   EXPECT_EQ(config.optimisation.simplex.pointCount, 5);
   EXPECT_EQ(config.randomSeed, -77);
@@ -213,10 +213,10 @@ TEST_F(SetupReaderTest, WarnsOfSearchSettingsThatEndASearchEarly) {
 
 TEST_F(SetupReaderTest, TheSetupIsLookedForWhereItsNameSays) {
   RunLog log;
-  EXPECT_EQ(withoutFolder(refusalOf([&] { readSetupFile(folder_ + "/none.kdx  ", log); })),
+  EXPECT_EQ(withoutFolder(refusalOf([&] { readSetupFile(folder_ / "none.kdx  ", log); })),
             "Error: Unable to open none.kdx\nNo such file or directory");
-  write("my.setup.KDX", edited(""));
-  EXPECT_EQ(readSetupFile(folder_ + "/model/../my.setup.KDX", log).setupName, "my.setup");
+  folder_.write("my.setup.KDX", edited(""));
+  EXPECT_EQ(readSetupFile(folder_ / "model/../my.setup.KDX", log).setupName, "my.setup");
 }
 
 }  // namespace

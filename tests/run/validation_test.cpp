@@ -206,11 +206,11 @@ TEST_F(ValidationTest, AcceptsTheValuesAtTheEdgeOfWhatIsValid) {
 }
 
 TEST_F(ValidationTest, RefusesAModelFileThatBearsTheNameOfTheSetup) {
-  write("Setup.SH", "#!/bin/sh\n");
+  folder_.write("Setup.SH", "#!/bin/sh\n");
   EXPECT_THAT(failure("'model\\run.sh' => 'Setup.SH'"),
               StartsWith("Error: Model simulation file and mirevo file are located in the same directory with an "
                          "identical name\nsetup.kdx:8:25: BatchFileName: "));
-  write("setup.txt", "#!/bin/sh\n");
+  folder_.write("setup.txt", "#!/bin/sh\n");
   EXPECT_THAT(failure("'model\\run.sh' => 'setup.txt'"), "") << "an ending that no model setup has";
 }
 
