@@ -10,6 +10,7 @@
 namespace mirevo::testing {
 namespace {
 
+using ::testing::AllOf;
 using ::testing::Contains;
 using ::testing::HasSubstr;
 using ::testing::Not;
@@ -163,7 +164,8 @@ TEST(Uncertainty, SummaryAndBandAreThoseOfTheSample) {
   EXPECT_NEAR(values[3], quantile(396 * 0.95), 1e-5);
   EXPECT_THAT(results.comments, Contains("# Band of flow: 100.0 % of 364 observations lie between the 5 and the 95 % "
                                          "quantile"));
-  EXPECT_THAT(folder.read("basin.log"), HasSubstr("\nBand of flow: 100.0 % of 364"));
+  EXPECT_THAT(folder.read("basin.log"), AllOf(HasSubstr("\nBand of flow: 100.0 % of 364"),
+                                              HasSubstr("\n400 model evaluations, 3 of them failed\n")));
 }
 
 TEST(Scenarios, ASetOfWrongLengthOrOutOfBoundsIsRefusedByItsName) {

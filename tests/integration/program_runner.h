@@ -2,18 +2,16 @@
 
 #include <cstdlib>
 #include <fcntl.h>
-#include <fstream>
-#include <functional>
 #include <map>
 #include <poll.h>
 #include <signal.h>
 #include <string>
 #include <sys/syscall.h>
 #include <sys/wait.h>
-#include <time.h>
 #include <unistd.h>
 #include <vector>
 
+#include "processes.h"
 #include "temporary_folder.h"
 
 namespace mirevo::testing {
@@ -81,25 +79,6 @@ class RunningProgram {
 inline ProgramResult runProgram(const std::vector<std::string>& arguments,
                                 const RunningProgram::Environment& environment = {}) {
   return RunningProgram(arguments, environment).wait();
-}
-
-/// Waits for something that another process does; false when it has not come in time.
-inline bool waitUntil(const std::function<bool()>& condition, double seconds = 20.0) {
-  for (int i = 0; i < static_cast<int>(seconds * 100.0); ++i) {
-    if (condition()) return true;
-    const timespec pause{0, 10'000'000};
-    ::nanosleep(&pause, nullptr);
-  }
-  return condition();
-}
-
-/// Whether a process runs; one that has ended and was not reaped yet does not.
-inline bool isRunning(int process) {
-  std::ifstream status("/proc/" + std::to_string(process) + "/stat");
-  std::string text;
-  if (!std::getline(status, text)) return false;
-  const auto state = text.rfind(") ");
-  return state != std::string::npos && text[state + 2] != 'Z' && text[state + 2] != 'X';
 }
 
 }  // namespace mirevo::testing

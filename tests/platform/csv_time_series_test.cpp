@@ -58,42 +58,38 @@ TEST(CsvTimeSeries, ReadsEveryFormOfFile) {
 TEST(CsvTimeSeries, RefusesWithThePlaceAndWhatWasExpected) {
   struct Case {
     std::string content;
-    std::string error;
+    std::string error;  ///< behind "s.csv:"
   };
   const std::string head = "# c\ntime,Q,H\n2001-01-31 00:00,1,2\n";
+  const std::string noHeader =
+      ":1: expected a header row (the time column's name, then one name an item), found the end of the file";
+  const std::string noTime = "4:1: expected a valid time like 2001-01-31 12:30, found ";
   const Case cases[] = {
-      {"",
-       "s.csv:1:1: expected a header row (the time column's name, then one name an item), found the end of the file"},
-      {"# only\n",
-       "s.csv:2:1: expected a header row (the time column's name, then one name an item), found the end of "
-       "the file"},
+      {"", "1" + noHeader},
+      {"# only\n", "2" + noHeader},
       {"time Q\n",
-       "s.csv:1:1: expected a header row with its columns separated by comma, semicolon or tab, found "
-       "\"time Q\""},
-      {"2001-01-31,1\n", "s.csv:1:1: expected a header row before the first time step, found \"2001-01-31,1\""},
-      {"# missing = \ntime,Q\n", "s.csv:1:12: expected a number after \"# missing =\", found \"\""},
-      {"# missing = none\ntime,Q\n", "s.csv:1:13: expected a number after \"# missing =\", found \"none\""},
-      {head + "2001-01-31,1,2\n", "s.csv:4:1: expected a time later than 2001-01-31 00:00, found 2001-01-31 00:00"},
+       "1:1: expected a header row with its columns separated by comma, semicolon or tab, found \"time Q\""},
+      {"2001-01-31,1\n", "1:1: expected a header row before the first time step, found \"2001-01-31,1\""},
+      {"# missing = \ntime,Q\n", "1:12: expected a number after \"# missing =\", found \"\""},
+      {"# missing = none\ntime,Q\n", "1:13: expected a number after \"# missing =\", found \"none\""},
+      {head + "2001-01-31,1,2\n", "4:1: expected a time later than 2001-01-31 00:00, found 2001-01-31 00:00"},
       {head + "2001-01-30 23:59:59,1,2\n",
-       "s.csv:4:1: expected a time later than 2001-01-31 00:00, found 2001-01-30 23:59:59"},
-      {head + "2001-02-29,1,2\n", "s.csv:4:1: expected a valid time like 2001-01-31 12:30, found \"2001-02-29\""},
-      {head + "31.01.2001,1,2\n", "s.csv:4:1: expected a valid time like 2001-01-31 12:30, found \"31.01.2001\""},
-      {head + "2001-02-01 24:01,1,2\n",
-       "s.csv:4:1: expected a valid time like 2001-01-31 12:30, found \"2001-02-01 24:01\""},
-      {head + "2001-02-01 12:30:60,1,2\n",
-       "s.csv:4:1: expected a valid time like 2001-01-31 12:30, found \"2001-02-01 12:30:60\""},
-      {head + ",1,2\n", "s.csv:4:1: expected a valid time like 2001-01-31 12:30, found \"\""},
-      {head + "2001-02-01,1\n", "s.csv:4:1: expected 3 columns as in the header row, found 2"},
-      {head + "2001-02-01\n", "s.csv:4:1: expected 3 columns as in the header row, found 1"},
-      {head + "2001-02-01,1,2,\r\n", "s.csv:4:1: expected 3 columns as in the header row, found 4"},
-      {head + "2001-02-01,\"1,2\n", "s.csv:4:1: expected 3 columns as in the header row, found 2"},
-      {head + std::string(10, '\0') + ",1,2\n",
-       "s.csv:4:1: expected a valid time like 2001-01-31 12:30, found \"??????????\""},
+       "4:1: expected a time later than 2001-01-31 00:00, found 2001-01-30 23:59:59"},
+      {head + "2001-02-29,1,2\n", noTime + "\"2001-02-29\""},
+      {head + "31.01.2001,1,2\n", noTime + "\"31.01.2001\""},
+      {head + "2001-02-01 24:01,1,2\n", noTime + "\"2001-02-01 24:01\""},
+      {head + "2001-02-01 12:30:60,1,2\n", noTime + "\"2001-02-01 12:30:60\""},
+      {head + ",1,2\n", noTime + "\"\""},
+      {head + std::string(10, '\0') + ",1,2\n", noTime + "\"??????????\""},
+      {head + "2001-02-01,1\n", "4:1: expected 3 columns as in the header row, found 2"},
+      {head + "2001-02-01\n", "4:1: expected 3 columns as in the header row, found 1"},
+      {head + "2001-02-01,1,2,\r\n", "4:1: expected 3 columns as in the header row, found 4"},
+      {head + "2001-02-01,\"1,2\n", "4:1: expected 3 columns as in the header row, found 2"},
   };
   for (const Case& c : cases) {
     CsvTimeSeries series;
     EXPECT_FALSE(series.parse("s.csv", c.content)) << c.content;
-    EXPECT_EQ(series.lastError(), c.error);
+    EXPECT_EQ(series.lastError(), "s.csv:" + c.error);
     EXPECT_EQ(series.timeStepCount(), 0);
   }
 }

@@ -3,7 +3,7 @@
 #include <cstdio>
 #include <filesystem>
 #include <fstream>
-#include <functional>
+#include <numeric>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -58,6 +58,17 @@ class NetcdfFile final {
     return variable;
   }
   void close() const { check(nc_close(id_)); }
+  /// Daily values of a variable "flow"; writes and closes the file.
+  void writeFlow(const std::vector<double>& flow) const {
+    const int days = dimension("time", flow.size());
+    const int axis = time(days, "days since 1990-01-01");
+    const int variable = this->variable("flow", NC_DOUBLE, {days});
+    std::vector<double> numbers(flow.size());
+    std::iota(numbers.begin(), numbers.end(), 0.0);
+    values(axis, numbers);
+    values(variable, flow);
+    close();
+  }
 
  private:
   static void check(int status) { ASSERT_EQ(status, NC_NOERR) << nc_strerror(status); }
@@ -174,12 +185,7 @@ TEST(NetcdfTimeSeries, RefusesByName) {
 
 TEST(NetcdfTimeSeries, AValueBeyondSinglePrecisionIsNamed) {
   NetcdfFile file("huge.nc");
-  const int time = file.dimension("time", 2);
-  const int axis = file.time(time, "days since 1990-01-01");
-  const int flow = file.variable("flow", NC_DOUBLE, {time});
-  file.values(axis, {0, 1});
-  file.values(flow, {0, -1e39});
-  file.close();
+  file.writeFlow({0, -1e39});
   NetcdfTimeSeries series;
   ASSERT_TRUE(series.open(file.path())) << series.lastError();
   EXPECT_FALSE(series.getData(1));
@@ -194,12 +200,7 @@ TEST(NetcdfTimeSeries, FilesThatAreNoneOrCutOffAreRefused) {
   std::string content;
   {
     NetcdfFile file("cut.nc");
-    const int time = file.dimension("time", 4);
-    const int axis = file.time(time, "days since 1990-01-01");
-    const int flow = file.variable("flow", NC_DOUBLE, {time});
-    file.values(axis, {0, 1, 2, 3});
-    file.values(flow, {0, 1, 2, 3});
-    file.close();
+    file.writeFlow({0, 1, 2, 3});
     std::ifstream in(file.path(), std::ios::binary);
     content.assign(std::istreambuf_iterator<char>(in), {});
   }

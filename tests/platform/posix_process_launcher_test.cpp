@@ -11,6 +11,7 @@
 #include <gtest/gtest.h>
 
 #include "platform/process_folder.h"
+#include "processes.h"
 #include "temporary_folder.h"
 
 namespace mirevo {
@@ -23,24 +24,6 @@ using Clock = std::chrono::steady_clock;
 
 double secondsSince(Clock::time_point start) {
   return std::chrono::duration<double>(Clock::now() - start).count();
-}
-
-/// Looks until it is so, at most for half a minute.
-bool comesTrue(const std::function<bool()>& condition) {
-  const auto start = Clock::now();
-  while (!condition()) {
-    if (secondsSince(start) > 30) return false;
-    ::usleep(2000);
-  }
-  return true;
-}
-
-/// Whether the process has ended, be it reaped or not.
-bool isGone(pid_t process) {
-  std::ifstream file("/proc/" + std::to_string(process) + "/stat");
-  std::string line;
-  if (!std::getline(file, line)) return true;
-  return line.compare(line.rfind(')') + 2, 1, "Z") == 0;
 }
 
 class PosixProcessLauncherTest : public testing::Test {
@@ -215,7 +198,7 @@ TEST_F(PosixProcessLauncherTest, EndsAndNamesWhatABatchLeavesBehind) {
   initialise();
   EXPECT_EQ(run(), BatchStatus::succeeded);
   const std::string id = read("stayed.pid");
-  EXPECT_TRUE(isGone(std::stoi(id)));
+  EXPECT_FALSE(isRunning(std::stoi(id)));
   EXPECT_EQ(launcher_.leftBehind(1),
             "run.sh left a process running, which was ended: test_model (" + id.substr(0, id.size() - 1) + ")");
   folder_.write("run_Process1/run.sh", "true\n");
@@ -230,9 +213,9 @@ TEST_F(PosixProcessLauncherTest, ADaemonMayServeLaterRunsButDoesNotOutliveThem) 
   initialise();
   EXPECT_EQ(run(), BatchStatus::succeeded);
   const int daemon = std::stoi(read("id.txt"));
-  EXPECT_FALSE(isGone(daemon));
+  EXPECT_TRUE(isRunning(daemon));
   launcher_.haltProcesses();
-  EXPECT_TRUE(isGone(daemon));
+  EXPECT_FALSE(isRunning(daemon));
 }
 
 TEST_F(PosixProcessLauncherTest, SlotsRunAtOnceAndTheWaitEndsWithTheFirst) {
@@ -275,13 +258,13 @@ TEST_F(PosixProcessLauncherTest, HaltingIsGentleFirstAndThenSure) {
     settings_.graceSeconds = c.graceSeconds;
     initialise();
     launcher_.createProcesses(1);
-    ASSERT_TRUE(comesTrue([&] { return hasContent("run_Process1/id.txt"); })) << c.script;
+    ASSERT_TRUE(waitUntil([&] { return hasContent("run_Process1/id.txt"); })) << c.script;
     const auto start = Clock::now();
     launcher_.haltProcesses();
     EXPECT_LT(secondsSince(start), c.atMostSeconds) << c.script;
     EXPECT_EQ(read("asked.txt") == "asked\n", c.gentle) << c.script;
     if (!c.gentle) {
-      EXPECT_TRUE(isGone(std::stoi(read("id.txt"))));
+      EXPECT_FALSE(isRunning(std::stoi(read("id.txt"))));
     }
   }
 }
@@ -316,7 +299,7 @@ TEST_F(PosixProcessLauncherTest, NothingOutlivesTheProgram) {
       if (!launcher.initialise(settings_)) ::_exit(9);
       launcher.createProcesses(1);
       launcher.createProcesses(2);
-      comesTrue([&] { return hasContent("run_Process1/id.txt") && hasContent("run_Process2/id.txt"); });
+      waitUntil([&] { return hasContent("run_Process1/id.txt") && hasContent("run_Process2/id.txt"); });
       c.end();
       ::_exit(9);
     }
@@ -327,7 +310,7 @@ TEST_F(PosixProcessLauncherTest, NothingOutlivesTheProgram) {
       for (const char* file : {"/id.txt", "/daemon.txt"}) {
         const std::string id = folder_.read(slot + std::string(file));
         ASSERT_FALSE(id.empty()) << c.name;
-        EXPECT_TRUE(comesTrue([&] { return isGone(std::stoi(id)); })) << c.name << file;
+        EXPECT_TRUE(waitUntil([&] { return !isRunning(std::stoi(id)); })) << c.name << file;
       }
       EXPECT_FALSE(folder_.exists(std::string(slot) + "/never.txt")) << c.name;
     }
@@ -394,7 +377,7 @@ TEST_F(PosixProcessLauncherTest, ABatchThatRunsTooLongIsEndedWithAllThatItStarte
     };
     launcher_.createProcesses(1);
     now_ += 70.0;
-    ASSERT_TRUE(comesTrue([&] { return look() && hasContent("run_Process1/grandchild.pid"); }));
+    ASSERT_TRUE(waitUntil([&] { return look() && hasContent("run_Process1/grandchild.pid"); }));
     now_ += 30.0;
     EXPECT_TRUE(look()) << "exactly the time that it may take";
     now_ += 0.5;
@@ -410,7 +393,7 @@ TEST_F(PosixProcessLauncherTest, ABatchThatRunsTooLongIsEndedWithAllThatItStarte
     EXPECT_EQ(launcher_.failure(1).detail, "slow.sh was ended because it ran longer than 100 seconds");
     if (c.needsKill) {
       const pid_t grandchild = std::atoi(read("grandchild.pid").c_str());
-      EXPECT_TRUE(comesTrue([&] { return isGone(grandchild); }));
+      EXPECT_TRUE(waitUntil([&] { return !isRunning(grandchild); }));
     }
   }
   settings_.batchItems.clear();

@@ -1,6 +1,8 @@
 #include "run/setup_summary.h"
 
-#include <gmock/gmock.h>
+#include <tuple>
+
+#include <gtest/gtest.h>
 
 #include "run/setup_fixture.h"
 
@@ -43,18 +45,20 @@ TEST_F(SetupSummaryTest, SaysWhatTheRunIsAboutToDo) {
 }
 
 TEST(TaskName, SaysWhatIsRun) {
-  RunConfig config;
-  const auto name = [&config](SimulationOption option) {
-    config.simulationOption = option;
-    return taskName(config);
-  };
-  EXPECT_EQ(name(SimulationOption::scenarioRuns), "Scenario runs: Single run using initial parameter set");
-  config.scenario.scenarioType = 1;
-  EXPECT_EQ(name(SimulationOption::scenarioRuns), "Scenario runs: Multiple runs");
-  EXPECT_THAT(name(SimulationOption::sensitivityAnalysis),
-              testing::StartsWith("Sensitivity analysis: Local sensitivity analysis"));
-  EXPECT_THAT(name(SimulationOption::uncertaintyAnalysis), testing::StartsWith("Uncertainty analysis"));
-  EXPECT_EQ(name(static_cast<SimulationOption>(4)), "none");
+  // The type of scenarios, differences or sampling.
+  for (const auto& [option, type, name] :
+       {std::tuple{0, 0, "Scenario runs: Single run using initial parameter set"},
+        {0, 1, "Scenario runs: Multiple runs"},
+        {1, 0, "Sensitivity analysis: Local sensitivity analysis, forward differences"},
+        {1, 1, "Sensitivity analysis: Local sensitivity analysis, central differences"},
+        {3, 0, "Uncertainty analysis: simple random sampling"},
+        {3, 1, "Uncertainty analysis: Latin hypercube sampling"},
+        {4, 0, "none"}}) {
+    RunConfig config;
+    config.simulationOption = static_cast<SimulationOption>(option);
+    config.scenario.scenarioType = config.sensitivity.local.differencing = config.uncertainty.uncertaintyType = type;
+    EXPECT_EQ(taskName(config), name);
+  }
 }
 
 }  // namespace

@@ -12,6 +12,9 @@
 namespace mirevo {
 namespace {
 
+using testing::DoubleEq;
+using testing::ElementsAre;
+
 /// Records what it is asked to evaluate; every result is good.
 class RecordingEvaluator final : public Evaluator {
  public:
@@ -72,14 +75,8 @@ TEST_F(TasksTest, MultipleRunsAreOneBatchAndComeBackToTheirModelValues) {
   run();
   ASSERT_EQ(evaluator_.batches.size(), 1U);
   ASSERT_EQ(evaluator_.batches[0].size(), 2U);
-  const std::vector<double> first = ToModelScale(space_, evaluator_.batches[0][0]);
-  const std::vector<double> second = ToModelScale(space_, evaluator_.batches[0][1]);
-  EXPECT_EQ(first[0], 0.1);
-  EXPECT_DOUBLE_EQ(first[1], 2.0);
-  EXPECT_EQ(first[2], 3.5);
-  EXPECT_EQ(second[0], -4.0);
-  EXPECT_DOUBLE_EQ(second[1], 412.5);
-  EXPECT_EQ(second[2], 2.5);
+  EXPECT_THAT(ToModelScale(space_, evaluator_.batches[0][0]), ElementsAre(0.1, DoubleEq(2.0), 3.5));
+  EXPECT_THAT(ToModelScale(space_, evaluator_.batches[0][1]), ElementsAre(-4.0, DoubleEq(412.5), 2.5));
 }
 
 TEST_F(TasksTest, AScenarioValueWithoutALogarithmIsRefusedByRunAndParameter) {
