@@ -109,6 +109,19 @@ class EvaluationTest : public testing::Test {
     return *evaluator_;
   }
 
+  /// Evaluates one set a value.
+  static std::vector<EvaluationResult> evaluate(Evaluator& evaluator, const std::vector<double>& values,
+                                                DispatchMode mode = DispatchMode::task) {
+    std::vector<ParameterSet> sets;
+    for (const double value : values) sets.push_back({value});
+    return evaluator.evaluateParameterSets(sets, mode);
+  }
+  static std::vector<double> measuresOf(const std::vector<EvaluationResult>& results) {
+    std::vector<double> values;
+    for (const EvaluationResult& result : results) values.push_back(result.measureValues.at(0));
+    return values;
+  }
+
   TemporaryFolder folder_;
   ModelDescription description_;
   LauncherSettings settings_;

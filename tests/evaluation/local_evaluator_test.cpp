@@ -2,7 +2,6 @@
 
 #include "evaluation/evaluation_fixture.h"
 #include "evaluation/fake_launcher.h"
-#include "platform/posix_process_launcher.h"
 
 namespace mirevo {
 namespace {
@@ -32,17 +31,12 @@ class LocalEvaluatorTest : public EvaluationTest {
     batch.output = {"reading", "no convergence"};
     return batch;
   }
-  static std::vector<double> measuresOf(const std::vector<EvaluationResult>& results) {
-    std::vector<double> values;
-    for (const EvaluationResult& result : results) values.push_back(result.measureValues.at(0));
-    return values;
-  }
 };
 
 TEST_F(LocalEvaluatorTest, OneSlotRunsOneSetAfterAnother) {
   FakeLauncher launcher([&](int, const std::string&) { return computes(20.0); });
   LocalEvaluator& evaluator = makeEvaluator(launcher, 1, 100);
-  const auto results = evaluator.evaluateParameterSets(std::vector<ParameterSet>{{2.0}, {4.0}}, DispatchMode::task);
+  const auto results = evaluate(evaluator, {2.0, 4.0});
   EXPECT_THAT(measuresOf(results), ElementsAre(1.0, 3.0));
   EXPECT_THAT(observer_.events, ElementsAre("Evaluation of parameter set No. 1 initiated",
                                             "Evaluation of parameter set No. 1 completed: OK", "record 1 a=2 OK",
@@ -58,8 +52,8 @@ TEST_F(LocalEvaluatorTest, EverySetsOutputIsSavedUnderItsNumberAndWarningsNameTh
   description_.savedFolder = folder_ / "run_Saved";
   FakeLauncher launcher([&](int start, const std::string&) { return start == 2 ? fails(1.0) : computes(3.0); });
   LocalEvaluator& evaluator = makeEvaluator(launcher, 2, 100);
-  evaluator.evaluateParameterSets(std::vector<ParameterSet>{{2.0}, {4.0}}, DispatchMode::task);
-  evaluator.evaluateParameterSets(std::vector<ParameterSet>{{9.0}, {6.0}}, DispatchMode::task);
+  evaluate(evaluator, {2.0, 4.0});
+  evaluate(evaluator, {9.0, 6.0});
   EXPECT_EQ(folder_.read("run_Saved/1/simulated.csv"), series(2.0));
   EXPECT_FALSE(folder_.exists("run_Saved/2/simulated.csv"));
   EXPECT_FALSE(folder_.exists("run_Saved/3"));  // not run
@@ -74,9 +68,7 @@ TEST_F(LocalEvaluatorTest, ResultsStandInTheOrderOfTheSetsWhateverEndsFirst) {
   FakeLauncher launcher(
       [&](int start, const std::string&) { return computes(seconds.at(static_cast<std::size_t>(start - 1))); });
   LocalEvaluator& evaluator = makeEvaluator(launcher, 3, 100);
-  std::vector<ParameterSet> sets;
-  for (int i = 0; i < 6; ++i) sets.push_back({0.5 * i});
-  const auto results = evaluator.evaluateParameterSets(sets, DispatchMode::task);
+  const auto results = evaluate(evaluator, {0.0, 0.5, 1.0, 1.5, 2.0, 2.5});
   EXPECT_THAT(measuresOf(results), ElementsAre(-1.0, -0.5, 0.0, 0.5, 1.0, 1.5));
   EXPECT_EQ(launcher.mostRunning, 3);
   EXPECT_DOUBLE_EQ(launcher.now, 5.0);  // a freed slot is filled at once
@@ -87,16 +79,14 @@ TEST_F(LocalEvaluatorTest, ResultsStandInTheOrderOfTheSetsWhateverEndsFirst) {
   EXPECT_THAT(records, ElementsAre("record 2", "record 4", "record 3", "record 6", "record 5", "record 1"));
 
   // Sets are numbered through the run, not the batch.
-  const auto second =
-      evaluator.evaluateParameterSets(std::vector<ParameterSet>{{3.0}}, DispatchMode::surrogateSelected);
+  const auto second = evaluate(evaluator, {3.0}, DispatchMode::surrogateSelected);
   EXPECT_EQ(second.at(0).number, 7);
 }
 
 TEST_F(LocalEvaluatorTest, AFailedRunHasTheFailedValueEverywhereAndTheRestGoesOn) {
   FakeLauncher launcher([&](int start, const std::string&) { return start == 2 ? fails(1.0) : computes(1.0); });
   LocalEvaluator& evaluator = makeEvaluator(launcher, 1, 10);
-  const auto results =
-      evaluator.evaluateParameterSets(std::vector<ParameterSet>{{2.0}, {3.0}, {4.0}}, DispatchMode::task);
+  const auto results = evaluate(evaluator, {2.0, 3.0, 4.0});
   EXPECT_THAT(measuresOf(results), ElementsAre(1.0, kFailedRunValue, 3.0));
   EXPECT_THAT(results[1].objectiveValues, ElementsAre(kFailedRunValue));
   EXPECT_EQ(results[1].aggregate, kFailedRunValue);
@@ -115,8 +105,7 @@ TEST_F(LocalEvaluatorTest, TheFailureAfterTheLimitEndsTheRunOnceItIsOnRecord) {
     observer_.events.clear();
     FakeLauncher launcher([&](int, const std::string&) { return fails(1.0); });
     LocalEvaluator& evaluator = makeEvaluator(launcher, 1, c.planned);
-    const std::vector<ParameterSet> sets(5, {2.0});
-    EXPECT_EQ(refusalOf([&] { evaluator.evaluateParameterSets(sets, DispatchMode::task); }),
+    EXPECT_EQ(refusalOf([&] { evaluate(evaluator, std::vector(5, 2.0)); }),
               fmt::format("Error: Unable to continue. No of failed simulations too high.\n"
                           "failed evaluations: {}; at most {} may fail, a tenth of the {} planned\n"
                           "the last of them, No. {}: run.sh exited with code 3\n| reading\n| no convergence",
@@ -129,8 +118,7 @@ TEST_F(LocalEvaluatorTest, TheFailureAfterTheLimitEndsTheRunOnceItIsOnRecord) {
 TEST_F(LocalEvaluatorTest, SetsThatCannotBeRunAreNotStarted) {
   FakeLauncher launcher([&](int, const std::string&) { return computes(1.0); });
   LocalEvaluator& evaluator = makeEvaluator(launcher, 1, 100);
-  const auto results =
-      evaluator.evaluateParameterSets(std::vector<ParameterSet>{{9.5}, {5.0}, {2.0}}, DispatchMode::task);
+  const auto results = evaluate(evaluator, {9.5, 5.0, 2.0});
   EXPECT_EQ(launcher.starts, 1);
   EXPECT_THAT(
       observer_.events,
@@ -147,13 +135,12 @@ TEST_F(LocalEvaluatorTest, CancellationHaltsWhatRunsAndStartsNothing) {
   FakeLauncher launcher([&](int, const std::string&) { return computes(100.0); });
   launcher.onWait = [&] { observer_.cancelled = launcher.now >= 6.0; };
   LocalEvaluator& evaluator = makeEvaluator(launcher, 2, 100);
-  const std::vector<ParameterSet> sets(4, {2.0});
-  EXPECT_THROW(evaluator.evaluateParameterSets(sets, DispatchMode::task), RunCancelled);
+  EXPECT_THROW(evaluate(evaluator, std::vector(4, 2.0)), RunCancelled);
   EXPECT_DOUBLE_EQ(launcher.now, 6.0);
   EXPECT_EQ(launcher.halts, 1);
   EXPECT_EQ(launcher.starts, 2);
   EXPECT_EQ(observer_.events.back(), "Simulation cancelled");
-  EXPECT_THROW(evaluator.evaluateParameterSets(sets, DispatchMode::task), RunCancelled);
+  EXPECT_THROW(evaluate(evaluator, std::vector(4, 2.0)), RunCancelled);
   EXPECT_EQ(launcher.starts, 2);
 }
 
@@ -163,7 +150,7 @@ TEST_F(LocalEvaluatorTest, WarnsOfProcessesLeftBehind) {
     batch.leftBehind = "run.sh left a process running";
     return batch;
   });
-  makeEvaluator(launcher, 1, 10).evaluateParameterSets(std::vector<ParameterSet>{{2.0}}, DispatchMode::task);
+  evaluate(makeEvaluator(launcher, 1, 10), {2.0});
   EXPECT_EQ(observer_.events.at(1), "warning: Evaluation of parameter set No. 1: run.sh left a process running");
 }
 
@@ -171,7 +158,7 @@ TEST_F(LocalEvaluatorTest, SettlesTheTransformationFromTheSampleWithoutItsFailur
   method_ = AggregationMethod::commonProbability;
   FakeLauncher launcher([&](int start, const std::string&) { return start == 2 ? fails(1.0) : computes(1.0); });
   LocalEvaluator& evaluator = makeEvaluator(launcher, 1, 100);
-  auto sample = evaluator.evaluateParameterSets(std::vector<ParameterSet>{{2.0}, {3.0}, {4.0}}, DispatchMode::task);
+  auto sample = evaluate(evaluator, {2.0, 3.0, 4.0});
   EXPECT_TRUE(std::isnan(sample[0].aggregate));
   evaluator.settleAggregates(sample);
   // Objective values 1 and 3: mean 2, standard deviation √2, so the aggregates are Φ(∓1/√2).
@@ -181,23 +168,11 @@ TEST_F(LocalEvaluatorTest, SettlesTheTransformationFromTheSampleWithoutItsFailur
   EXPECT_THAT(observer_.events.back(), ::testing::HasSubstr("Standard deviation = 1.414"));
 }
 
-TEST_F(LocalEvaluatorTest, RunsRealProcesses) {
-  PosixProcessLauncher launcher;
-  LocalEvaluator& evaluator = makeEvaluator(launcher, 2, 100);
-  std::vector<ParameterSet> sets;
-  for (int i = 0; i < 8; ++i) sets.push_back({0.25 * i});
-  const auto results = evaluator.evaluateParameterSets(sets, DispatchMode::task);
-  EXPECT_THAT(measuresOf(results), ElementsAre(-1.0, -0.75, -0.5, -0.25, 0.0, 0.25, 0.5, 0.75));
-  EXPECT_EQ(folder_.read("base/parameters.txt"), "a = 0\n");
-  EXPECT_EQ(folder_.read("base/simulated.csv"), series(0.0));
-}
-
 TEST_F(LocalEvaluatorTest, WhatAnEarlierRunHasEvaluatedIsNotRunAgain) {
   FakeLauncher launcher([&](int, const std::string&) { return computes(1.0); });
   takeUp({{1, 2.0}, {3, -4.0}, {5, 6.0}});
   LocalEvaluator& evaluator = makeEvaluator(launcher, 2, 10);
-  auto results =
-      evaluator.evaluateParameterSets(std::vector<ParameterSet>{{2.0}, {3.0}, {4.0}, {1.5}}, DispatchMode::task);
+  auto results = evaluate(evaluator, {2.0, 3.0, 4.0, 1.5});
   EXPECT_THAT(measuresOf(results), ElementsAre(1.0, 2.0, 3.0, 0.5));
   EXPECT_EQ(results[0].aggregate, 1.0);
   EXPECT_EQ(results[2].failure->reason, "in the past");
@@ -209,7 +184,7 @@ TEST_F(LocalEvaluatorTest, WhatAnEarlierRunHasEvaluatedIsNotRunAgain) {
                   "Evaluation of parameter set No. 4 initiated", "Evaluation of parameter set No. 2 completed: OK",
                   "record 2 a=3 OK", "Evaluation of parameter set No. 4 completed: OK", "record 4 a=1.5 OK"));
   // A final run is made for its folder, but has its row already.
-  results = evaluator.evaluateParameterSets(std::vector<ParameterSet>{{6.0}}, DispatchMode::finalRun);
+  results = evaluate(evaluator, {6.0}, DispatchMode::finalRun);
   EXPECT_EQ(launcher.starts, 3);
   EXPECT_EQ(observer_.events.back(), "replay 5 a=6 OK");
 }
@@ -218,8 +193,9 @@ TEST_F(LocalEvaluatorTest, AnotherSetUnderTheSameNumberIsNoReplay) {
   FakeLauncher launcher([&](int, const std::string&) { return computes(1.0); });
   takeUp({{2, 3.0}});
   LocalEvaluator& evaluator = makeEvaluator(launcher, 1, 10);
-  const std::vector<ParameterSet> sets{{1.0}, {std::nextafter(3.0, 4.0)}};
-  EXPECT_THAT(refusalOf([&] { evaluator.evaluateParameterSets(sets, DispatchMode::task); }),
+  EXPECT_THAT(refusalOf([&] {
+                evaluate(evaluator, {1.0, std::nextafter(3.0, 4.0)});
+              }),
               testing::StartsWith("Error: Unable to continue the earlier run\n"
                                   "evaluation No. 2 has a = 3 in the earlier results, and 3.0000000000000004 now, "
                                   "though the settings are the same."));
@@ -234,8 +210,7 @@ TEST_F(LocalEvaluatorTest, TheFoldersOfTheFirstFailedRunsAreKept) {
   });
   takeUp({{1, -4.0}});
   LocalEvaluator& evaluator = makeEvaluator(launcher, 1, 100);
-  const std::vector<ParameterSet> sets{{4.0}, {9.5}, {2.0}, {3.0}, {1.0}};
-  evaluator.evaluateParameterSets(sets, DispatchMode::task);
+  evaluate(evaluator, {4.0, 9.5, 2.0, 3.0, 1.0});
   EXPECT_FALSE(folder_.exists("run_Failed1")) << "of the earlier run";
   EXPECT_FALSE(folder_.exists("run_Failed2")) << "no model run";
   EXPECT_EQ(folder_.read("run_Failed3/mirevo_batch.log"), "why");

@@ -62,11 +62,8 @@ TEST_F(MpiEvaluatorTest, WhoeverIsFreeGetsTheNextSetAndResultsStandInTheOrderOfT
   becomeReady(2);
   becomeReady(1);
   answerLargestFirst();
-  const auto results =
-      master.evaluateParameterSets(std::vector<ParameterSet>{{4.0}, {2.0}, {3.0}, {6.0}}, DispatchMode::task);
-  std::vector<double> measures;
-  for (const EvaluationResult& result : results) measures.push_back(result.measureValues.at(0));
-  EXPECT_THAT(measures, ElementsAre(3.0, 1.0, 2.0, 5.0));
+  const auto results = evaluate(master, {4.0, 2.0, 3.0, 6.0});
+  EXPECT_THAT(measuresOf(results), ElementsAre(3.0, 1.0, 2.0, 5.0));
   EXPECT_THAT(
       observer_.events,
       ElementsAre("Worker 2 is ready on node, process folder /folder", "Evaluation of parameter set No. 1 initiated",
@@ -81,7 +78,7 @@ TEST_F(MpiEvaluatorTest, WhoeverIsFreeGetsTheNextSetAndResultsStandInTheOrderOfT
   EXPECT_THAT(receivers, ElementsAre(2, 1, 2, 2));
 
   // The numbers go on, and of two free workers the first is taken.
-  const auto next = master.evaluateParameterSets(std::vector<ParameterSet>{{1.0}}, DispatchMode::task);
+  const auto next = evaluate(master, {1.0});
   EXPECT_EQ(next.at(0).number, 5);
   EXPECT_EQ(channel_.sent.back().rank, 1);
   EXPECT_EQ(launcher_.starts, 0);
@@ -91,7 +88,7 @@ TEST_F(MpiEvaluatorTest, SetsThatCannotBeRunAreSentToNobody) {
   MpiEvaluator& master = makeMaster();
   becomeReady(1);
   answerLargestFirst();
-  const auto results = master.evaluateParameterSets(std::vector<ParameterSet>{{9.5}, {5.0}, {2.0}}, DispatchMode::task);
+  const auto results = evaluate(master, {9.5, 5.0, 2.0});
   EXPECT_EQ(channel_.sent.size(), 1U);
   EXPECT_EQ(results[0].failure->kind, EvaluationFailure::Kind::constraintsViolated);
   EXPECT_EQ(results[1].failure->kind, EvaluationFailure::Kind::equationNotFinite);
@@ -104,10 +101,10 @@ TEST_F(MpiEvaluatorTest, TheMasterComputesAggregatesAsItAloneKnowsTheTransformat
   MpiEvaluator& master = makeMaster();
   becomeReady(1);
   answerLargestFirst();
-  auto sample = master.evaluateParameterSets(std::vector<ParameterSet>{{2.0}, {3.0}, {4.0}}, DispatchMode::task);
+  auto sample = evaluate(master, {2.0, 3.0, 4.0});
   EXPECT_TRUE(std::isnan(sample[0].aggregate));
   master.settleAggregates(sample);
-  const auto later = master.evaluateParameterSets(std::vector<ParameterSet>{{2.0}}, DispatchMode::task);
+  const auto later = evaluate(master, {2.0});
   EXPECT_FALSE(std::isnan(later[0].aggregate));
   EXPECT_EQ(later[0].aggregate, sample[0].aggregate);
   EXPECT_NE(later[0].aggregate, -99.0);
@@ -121,8 +118,7 @@ TEST_F(MpiEvaluatorTest, FailedRunsOfAllWorkersCountTogether) {
     ResultMessage failed{runner_->failedResult({EvaluationFailure::Kind::exitCode, "code 3", {"last words"}}), "left"};
     channel_.deliver(message.rank, RankMessage::result, encode(failed));
   };
-  const std::vector<ParameterSet> sets(4, {2.0});
-  EXPECT_THAT(refusalOf([&] { master.evaluateParameterSets(sets, DispatchMode::task); }),
+  EXPECT_THAT(refusalOf([&] { evaluate(master, std::vector(4, 2.0)); }),
               AllOf(StartsWith("Error: Unable to continue. No of failed simulations too high.\n"),
                     HasSubstr("code 3\n| last words")));
   EXPECT_EQ(failedRuns_->failedCount(), 2);
@@ -134,7 +130,7 @@ TEST_F(MpiEvaluatorTest, AWorkersFatalErrorIsTheMastersWithItsPlace) {
   becomeReady(1);
   becomeReady(2);
   channel_.deliver(2, RankMessage::failure, encode(FailureMessage{"Error: Unable to open x", "No space left"}));
-  EXPECT_EQ(refusalOf([&] { master.evaluateParameterSets(std::vector<ParameterSet>{{2.0}}, DispatchMode::task); }),
+  EXPECT_EQ(refusalOf([&] { evaluate(master, {2.0}); }),
             "Error: Unable to open x\nNo space left\nreported by worker 2 on node");
 }
 
@@ -145,7 +141,7 @@ TEST_F(MpiEvaluatorTest, ACancelledRunStopsWhileWorkersAreBusy) {
     EXPECT_LE(seconds, 3.0);
     observer_.cancelled = !running_.empty();
   };
-  EXPECT_THROW(master.evaluateParameterSets(std::vector<ParameterSet>(4, {2.0}), DispatchMode::task), RunCancelled);
+  EXPECT_THROW(evaluate(master, std::vector(4, 2.0)), RunCancelled);
   EXPECT_EQ(observer_.events.back(), "EM: Simulation cancelled");
 }
 
@@ -168,7 +164,7 @@ TEST_F(MpiEvaluatorTest, StoppingGoesInRankOrderAndEndsWithTheLastFarewell) {
 TEST_F(MpiEvaluatorTest, WhatAnEarlierRunHasEvaluatedNeedsNoWorker) {
   takeUp({{1, 2.0}, {2, 3.0}});
   MpiEvaluator& master = makeMaster();
-  const auto results = master.evaluateParameterSets(std::vector<ParameterSet>{{2.0}, {3.0}}, DispatchMode::task);
+  const auto results = evaluate(master, {2.0, 3.0});
   EXPECT_EQ(results[1].aggregate, 2.0);
   EXPECT_THAT(channel_.sent, testing::IsEmpty());
 }
@@ -184,7 +180,7 @@ TEST_F(MpiEvaluatorTest, TheWorkerOfAnEarlyFailureIsToldToKeepItsFolder) {
     message.result.failure = EvaluationFailure{EvaluationFailure::Kind::timedOut, "too long", {}};
     channel_.deliver(1, RankMessage::result, encode(message));
   };
-  master.evaluateParameterSets(std::vector<ParameterSet>{{2.0}, {3.0}}, DispatchMode::task);
+  evaluate(master, {2.0, 3.0});
   ASSERT_EQ(channel_.sent.size(), 3U);  // set, keep, set
   EXPECT_EQ(channel_.sent[1].tag, static_cast<int>(RankMessage::keepFolder));
   EXPECT_EQ(decodeKeepFolder(channel_.sent[1].content).number, 1);

@@ -76,6 +76,11 @@ FaultyRun::FaultyRun(RunSettings settings, bool restarts, const std::string& mod
   for (const auto& entry : fs::directory_iterator(path())) inputs_.insert(entry.path().filename());
 }
 
+FaultyRun::Environment FaultyRun::injection(Environment more) const {
+  more.insert({{"LD_PRELOAD", MIREVO_FAULT_INJECTOR}, {"FAULT_PROGRAM", MIREVO_PROGRAM}, {"FAULT_FOLDER", path()}});
+  return more;
+}
+
 void FaultyRun::reset() const {
   for (const auto& entry : fs::directory_iterator(path())) {
     if (!inputs_.contains(entry.path().filename())) fs::remove_all(entry.path());

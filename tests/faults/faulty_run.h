@@ -37,6 +37,9 @@ class FaultyRun {
   std::string setup() const { return folder_ / "basin.kdx"; }
   const std::string& resultFileName() const { return resultFileName_; }
 
+  /// The environment in which a run of the setup takes the faults that `more` describes: see fault_injector.cpp.
+  Environment injection(Environment more) const;
+
   /// Removes what runs left and puts the outputs of an "earlier run" there, which must survive all that comes; or what
   /// was there at startFromHere().
   void reset() const;

@@ -156,26 +156,16 @@ Expectation expectationOf(const Fault& fault, const FaultyRun& run) {
   return expected;
 }
 
-FaultyRun::Environment injection(const FaultyRun& run, const std::string& fault, const std::string& record) {
-  return {{"LD_PRELOAD", MIREVO_FAULT_INJECTOR},
-          {"FAULT_PROGRAM", MIREVO_PROGRAM},
-          {"FAULT_FOLDER", run.path()},
-          {"FAULT_RECORD", record},
-          {"FAULT", fault}};
-}
-
 /// Brings the folder into the state of a run that was killed in the middle of its evaluations, and has the calls of
 /// going on from there in the record.
 void leaveInterrupted(FaultyRun& run, const TemporaryFolder& records) {
   const std::string calls = records.read("calls");
-  auto environment = injection(run, "", "");
   const auto count = std::count(calls.begin(), calls.end(), '\n');
-  environment["FAULT_KILL"] = std::to_string(count * 3 / 4);
   run.reset();
-  run.run(environment);
+  run.run(run.injection({{"FAULT_KILL", std::to_string(count * 3 / 4)}}));
   run.startFromHere();
   std::filesystem::remove(records / "calls");
-  run.run(injection(run, "", records / "calls"));
+  run.run(run.injection({{"FAULT_RECORD", records / "calls"}}));
 }
 
 }  // namespace
@@ -202,7 +192,7 @@ void tryInjectedFaults(bool isLong, FaultReport& report) {
   for (const auto& [setting, isRestart] : cases) {
     FaultyRun run(setting, isRestart, setting.slots > 1 ? slowFirst : "");
     const TemporaryFolder records;
-    if (!run.makeReference(injection(run, "", records / "calls"))) {
+    if (!run.makeReference(run.injection({{"FAULT_RECORD", records / "calls"}}))) {
       report.tried("undisturbed run", fmt::format("option {}", setting.option), {"fails"});
       continue;
     }
@@ -210,7 +200,8 @@ void tryInjectedFaults(bool isLong, FaultReport& report) {
     for (const Fault& fault : faultsOf(countCalls(records.read("calls")), isLong, triedInShort)) {
       run.reset();
       std::filesystem::remove(records / "trial");
-      const ProgramResult result = run.run(injection(run, fault.text(), records / "trial"));
+      const ProgramResult result =
+          run.run(run.injection({{"FAULT", fault.text()}, {"FAULT_RECORD", records / "trial"}}));
       if (records.read("trial").find("failed\t") == std::string::npos) continue;  // another slot took that run
       const std::vector<std::string> problems = run.check(result, expectationOf(fault, run));
       report.tried(

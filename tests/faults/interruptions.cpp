@@ -19,10 +19,6 @@ RunSettings settingsOf(int option) {
   return settings;
 }
 
-FaultyRun::Environment injection(const FaultyRun& run) {
-  return {{"LD_PRELOAD", MIREVO_FAULT_INJECTOR}, {"FAULT_PROGRAM", MIREVO_PROGRAM}, {"FAULT_FOLDER", run.path()}};
-}
-
 void pauseMilliseconds(int milliseconds) {
   const timespec pause{milliseconds / 1000, milliseconds % 1000 * 1'000'000L};
   ::nanosleep(&pause, nullptr);
@@ -33,16 +29,13 @@ void pauseMilliseconds(int milliseconds) {
 void tryKills(int option, bool restarts, int count, FaultReport& report) {
   FaultyRun run(settingsOf(option), restarts);
   const TemporaryFolder records;
-  FaultyRun::Environment environment = injection(run);
-  environment["FAULT_RECORD"] = records / "calls";
-  run.makeReference(environment);
+  run.makeReference(run.injection({{"FAULT_RECORD", records / "calls"}}));
   const std::string calls = records.read("calls");
   std::mt19937 generator(static_cast<unsigned>(option));
   const auto callCount = static_cast<unsigned long>(std::count(calls.begin(), calls.end(), '\n'));
   for (int i = 0; i < count && callCount > 0; ++i) {
     const unsigned long moment = 1 + generator() % callCount;
-    environment = injection(run);
-    environment["FAULT_KILL"] = std::to_string(moment);
+    const auto environment = run.injection({{"FAULT_KILL", std::to_string(moment)}});
     run.reset();
     const ProgramResult result = run.run(environment);
     if (result.signal != SIGKILL) continue;  // with several slots the number of calls is not always the same
@@ -106,10 +99,8 @@ void tryClocks(FaultReport& report) {
     FaultyRun run(settingsOf(option));
     run.makeReference();
     for (const char* step : {"1", "3600", "-86400", "31557600", "2000000000"}) {
-      FaultyRun::Environment environment = injection(run);
-      environment["FAULT_CLOCK"] = step;
       run.reset();
-      const ProgramResult result = run.run(environment);
+      const ProgramResult result = run.run(run.injection({{"FAULT_CLOCK", step}}));
       auto problems = run.check(result, {.mayPassSilently = true});
       if (result.exitCode != 0) problems.push_back(fmt::format("exit code {}", result.exitCode));
       report.tried("clock set back", fmt::format("option {}, by {} s at each look", option, step), problems);

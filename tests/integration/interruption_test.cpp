@@ -26,15 +26,8 @@ class Interruption : public ::testing::Test {
     setup_ = folder_.writeSetup({.option = 0, .scenarios = {"1, 1, 1", "2, 2, 1"}, .modelArguments = modelArguments});
   }
 
-  /// Waits until a file with a process id is there, and returns that.
-  int waitForProcess(const std::string& name) {
-    const std::string file = "basin_Process1/" + name;
-    EXPECT_TRUE(waitUntil([&] { return folder_.exists(file) && folder_.read(file).ends_with("\n"); }))
-        << folder_.read("basin.log");
-    return std::atoi(folder_.read(file).c_str());
-  }
   /// The model's own child, which ignores SIGTERM.
-  int waitForGrandchild() { return waitForProcess("grandchild.pid"); }
+  int waitForGrandchild() { return folder_.waitForProcess("basin_Process1/grandchild.pid"); }
 
   void expectGone(int process) {
     EXPECT_GT(process, 0);
@@ -55,7 +48,7 @@ TEST_F(Interruption, AKillFileEndsTheRunWithinThreeSecondsAndNothingIsLeft) {
   writeSetup("");
   folder_.write("basin._kill_", "from an earlier run");
   RunningProgram program({setup_});
-  const int model = waitForProcess("model.pid");
+  const int model = folder_.waitForProcess("basin_Process1/model.pid");
   folder_.write("basin._kill_", "");
   const ProgramResult result = program.wait(3.0);  // models that ignore SIGTERM have 2 seconds of grace
   EXPECT_FALSE(result.timedOut);

@@ -48,6 +48,11 @@ class ModelFolder : public TemporaryFolder {
 
   /// Writes `basin.kdx` and returns its path.
   std::string writeSetup(const RunSettings& settings) const { return write("basin.kdx", setupText(settings)); }
+  /// Waits until the file holds a process id, and returns that.
+  int waitForProcess(const std::string& name) const {
+    EXPECT_TRUE(waitUntil([&] { return exists(name) && read(name).ends_with("\n"); })) << read("basin.log");
+    return std::atoi(read(name).c_str());
+  }
   /// Replaces a text in `basin.kdx`, which must hold it.
   void editSetup(const std::string& from, const std::string& to) const {
     std::string text = read("basin.kdx");

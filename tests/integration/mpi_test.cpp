@@ -53,11 +53,6 @@ class Mpi : public ::testing::Test {
   }
   std::string log() const { return folder_.read("basin.log"); }
 
-  /// Waits until the file holds a process id, and returns that.
-  int waitForProcess(const std::string& name) const {
-    EXPECT_TRUE(waitUntil([&] { return folder_.exists(name) && folder_.read(name).ends_with("\n"); })) << log();
-    return std::atoi(folder_.read(name).c_str());
-  }
   static void expectGone(int process) {
     EXPECT_GT(process, 0);
     EXPECT_TRUE(waitUntil([&] { return !isRunning(process); }, 5.0)) << process;
@@ -206,9 +201,9 @@ class HangingMpi : public Mpi {
   }
   /// Once this returns, all sets but one have been evaluated by the other worker.
   void waitUntilOneIsLeft() {
-    model_ = waitForProcess("model.pid");
-    worker_ = waitForProcess("worker.pid");
-    grandchild_ = waitForProcess("grandchild.pid");
+    model_ = folder_.waitForProcess("model.pid");
+    worker_ = folder_.waitForProcess("worker.pid");
+    grandchild_ = folder_.waitForProcess("grandchild.pid");
     EXPECT_TRUE(waitUntil([&] { return occurrences(log(), " completed: OK") == 11; })) << log();
   }
   void expectAllGone() {

@@ -51,6 +51,7 @@ TEST(Optimisation, ACalibrationEndsWithItsBestSetInLogResultsAndModelFolder) {
   EXPECT_THAT(folder.read("basin._spi_"), HasSubstr("\nMESLBL of 201\n"));
   EXPECT_EQ(folder.read("basin_Termination.log"), "Successful completion\n");
   EXPECT_FALSE(folder.exists("calSimErr.dat"));
+  EXPECT_EQ(folder.read("model/parameters.txt"), "a = 5\nb = 2\nc = 1\n") << "the model's own folder is never written";
   EXPECT_NEAR(number(folder.read("basin_Process1/parameters.txt").substr(4)), number(table.rows.back()[2]), 1e-6);
 }
 

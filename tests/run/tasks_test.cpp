@@ -64,11 +64,6 @@ class TasksTest : public ::testing::Test {
   RunLog log_;
 };
 
-TEST_F(TasksTest, ASingleRunEvaluatesTheInitialSetOnce) {
-  EXPECT_EQ(run(), "Normal termination");
-  EXPECT_EQ(evaluator_.batches, (std::vector<std::vector<ParameterSet>>{{space_.initial}}));
-}
-
 TEST_F(TasksTest, MultipleRunsAreOneBatchAndComeBackToTheirModelValues) {
   config_.scenario.scenarioType = 1;
   config_.scenario.runs = {{0.1, 7.0, 2.0, 3.7}, {-4.0, 7.0, 412.5, 2.5}};
