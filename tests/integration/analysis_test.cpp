@@ -13,7 +13,6 @@ namespace {
 using ::testing::AllOf;
 using ::testing::Contains;
 using ::testing::HasSubstr;
-using ::testing::Not;
 using ::testing::StartsWith;
 
 /// The numbers of a report's row: those behind `name` in the first comment that begins with it, after a line that
@@ -111,13 +110,6 @@ exec awk '
   EXPECT_THAT(results.comments, Contains(StartsWith("# Warning: Parameters a and b are correlated by -0.99")));
 }
 
-TEST(LocalSensitivity, WithFewerThanTenModelRunsTheFirstFailureIsFatal) {
-  const ModelFolder folder;
-  EXPECT_EQ(runProgram({folder.writeSetup({.option = 1, .modelArguments = "--fail-above 4.01"})}).exitCode, 1);
-  EXPECT_THAT(folder.read("basin.log"), HasSubstr("No of failed simulations too high."));
-  EXPECT_THAT(folder.read("basin.log"), Not(HasSubstr("Derivatives")));
-}
-
 TEST(Uncertainty, SummaryAndBandAreThoseOfTheSample) {
   const ModelFolder folder;
   std::string observed = folder.read("observed.csv");
@@ -166,24 +158,6 @@ TEST(Uncertainty, SummaryAndBandAreThoseOfTheSample) {
                                          "quantile"));
   EXPECT_THAT(folder.read("basin.log"), AllOf(HasSubstr("\nBand of flow: 100.0 % of 364"),
                                               HasSubstr("\n400 model evaluations, 3 of them failed\n")));
-}
-
-TEST(Scenarios, ASetOfWrongLengthOrOutOfBoundsIsRefusedByItsName) {
-  const struct {
-    const char* values;
-    const char* message;
-  } cases[] = {{"1, 2", "Error: Invalid number of parameter values in SCENARIO_2"},
-               {"1, 2, 1, 1", "Error: Invalid number of parameter values in SCENARIO_2"},
-               {"11, 2, 1", "Error: Value for parameter a in SCENARIO_2 out of bounds"},
-               {"1, -0.5, 1", "Error: Value for parameter b in SCENARIO_2 out of bounds"}};
-  for (const auto& c : cases) {
-    const ModelFolder folder;
-    const ProgramResult run = runProgram({folder.writeSetup({.option = 0, .scenarios = {"1, 2, 1", c.values}})});
-    EXPECT_EQ(run.exitCode, 1) << c.values;
-    EXPECT_THAT(run.error, StartsWith(std::string("Mirevo: ") + c.message));
-    EXPECT_THAT(run.error, HasSubstr("basin.kdx:"));
-    EXPECT_FALSE(folder.exists("basin.dat"));
-  }
 }
 
 }  // namespace

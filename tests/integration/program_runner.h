@@ -36,6 +36,11 @@ class RunningProgram {
     if (process_ != 0) return;
     ::dup2(::open((outputs_ / "out").c_str(), O_WRONLY | O_CREAT, 0666), STDOUT_FILENO);
     ::dup2(::open((outputs_ / "err").c_str(), O_WRONLY | O_CREAT, 0666), STDERR_FILENO);
+    become(program, arguments, environment);
+  }
+  /// Lets this process, a child of the test, run the program instead.
+  [[noreturn]] static void become(const char* program, const std::vector<std::string>& arguments,
+                                  const Environment& environment) {
     for (const char* name : {"G48", "BUILDMODE", "VOLK_PROGRESS"}) ::unsetenv(name);
     for (const auto& [name, value] : environment) ::setenv(name.c_str(), value.c_str(), 1);
     std::vector<char*> argv{const_cast<char*>(program)};

@@ -22,15 +22,10 @@ class TerminalProgram {
     winsize size{24, 80, 0, 0};
     process_ = ::forkpty(&terminal_, nullptr, nullptr, &size);
     if (process_ != 0) return;
-    for (const char* name : {"G48", "VOLK_PROGRESS", "LC_ALL", "LC_CTYPE", "LANG"}) ::unsetenv(name);
+    for (const char* name : {"LC_ALL", "LC_CTYPE", "LANG"}) ::unsetenv(name);
     ::setenv("TERM", "xterm", 1);
     ::setenv("NO_COLOR", "1", 1);
-    for (const auto& [name, value] : environment) ::setenv(name.c_str(), value.c_str(), 1);
-    std::vector<char*> argv;
-    for (const std::string& argument : command) argv.push_back(const_cast<char*>(argument.c_str()));
-    argv.push_back(nullptr);
-    ::execv(argv.front(), argv.data());
-    ::_exit(127);
+    RunningProgram::become(command[0].c_str(), {command.begin() + 1, command.end()}, environment);
   }
   ~TerminalProgram() {
     hangUp();

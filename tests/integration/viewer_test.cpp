@@ -27,6 +27,15 @@ RunSettings slowRun() {
 
 class ViewerTest : public ::testing::Test {
  protected:
+  void writeRun(const std::string& furtherRecords = "") const {
+    folder_.write("basin.kdx", "");
+    folder_.write("basin._spi_", runningRun() + furtherRecords);
+  }
+  static void cancelAndConfirm(TerminalProgram& viewer) {
+    viewer.type("q");
+    ASSERT_TRUE(viewer.shows("Cancel the run?"));
+    viewer.type("y");
+  }
   std::vector<std::string> attached() const { return {MIREVO_VIEWER, (folder_ / "basin.kdx")}; }
   bool reaches(const std::string& file, const std::string& text) const {
     return waitUntil([&] { return folder_.read(file).find(text) != std::string::npos; });
@@ -60,9 +69,7 @@ TEST_F(ViewerTest, AttachedItFollowsARunAndOnlyAConfirmedKeyCancelsIt) {
     ASSERT_TRUE(viewer.shows("q cancel run"));
   }
   EXPECT_FALSE(folder_.exists("basin._kill_"));
-  viewer.type("q");
-  ASSERT_TRUE(viewer.shows("Cancel the run?"));
-  viewer.type("y");
+  cancelAndConfirm(viewer);
   ASSERT_TRUE(viewer.shows("Cancelling"));
   EXPECT_TRUE(folder_.exists("basin._kill_"));
   folder_.write("basin._spi_", runningRun() + "STATUSEnded: Simulation cancelled\nPROGRE100.0\n");
@@ -72,8 +79,7 @@ TEST_F(ViewerTest, AttachedItFollowsARunAndOnlyAConfirmedKeyCancelsIt) {
 }
 
 TEST_F(ViewerTest, AttachedLeavingInAnyWayLeavesNoTrace) {
-  folder_.write("basin.kdx", "");
-  folder_.write("basin._spi_", runningRun());
+  writeRun();
   for (const std::string key : {"d", "\x03", ""}) {
     TerminalProgram viewer(attached());
     ASSERT_TRUE(viewer.shows("Hand-made"));
@@ -86,14 +92,11 @@ TEST_F(ViewerTest, AttachedLeavingInAnyWayLeavesNoTrace) {
 }
 
 TEST_F(ViewerTest, AKillFileThatCannotBeMadeIsSaid) {
-  folder_.write("basin.kdx", "");
-  folder_.write("basin._spi_", runningRun());
+  writeRun();
   std::filesystem::create_symlink("no/such/folder/file", (folder_ / "basin._kill_"));
   TerminalProgram viewer(attached());
   ASSERT_TRUE(viewer.shows("Hand-made"));
-  viewer.type("q");
-  ASSERT_TRUE(viewer.shows("Cancel the run?"));
-  viewer.type("y");
+  cancelAndConfirm(viewer);
   EXPECT_TRUE(viewer.shows("Unable to cancel"));
 }
 
@@ -160,9 +163,7 @@ TEST_F(ViewerTest, CancellingARunThatIsOnlyStartingLeavesAnotherRunAlone) {
   ASSERT_TRUE(reaches("basin._spi_", "COMSPD"));
   TerminalProgram viewer({MIREVO_PROGRAM, "//qmon", setup});
   ASSERT_TRUE(viewer.shows("The run is starting."));
-  viewer.type("q");
-  ASSERT_TRUE(viewer.shows("Cancel the run?"));
-  viewer.type("y");
+  cancelAndConfirm(viewer);
   EXPECT_EQ(viewer.wait(), 128 + SIGTERM);
   EXPECT_THAT(viewer.output(), HasSubstr("Mirevo: Termination request"));
   EXPECT_FALSE(folder_.exists("basin._kill_"));
@@ -170,8 +171,7 @@ TEST_F(ViewerTest, CancellingARunThatIsOnlyStartingLeavesAnotherRunAlone) {
 }
 
 TEST_F(ViewerTest, NoPersonIsWaitedForAtNight) {
-  folder_.write("basin.kdx", "");
-  folder_.write("basin._spi_", runningRun() + "STATUSEnded: Normal termination\nPROGRE100.0\n");
+  writeRun("STATUSEnded: Normal termination\nPROGRE100.0\n");
   TerminalProgram viewer(attached(), {{"BUILDMODE", "NIGHT"}});
   EXPECT_EQ(viewer.wait(), 0);
 }

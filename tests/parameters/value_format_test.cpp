@@ -1,9 +1,12 @@
 #include "parameters/value_format.h"
 
 #include <cmath>
-#include <limits>
+#include <cstdlib>
 #include <random>
+#include <sstream>
+#include <string>
 
+#include <fmt/format.h>
 #include <gtest/gtest.h>
 
 #include "common/text.h"
@@ -12,73 +15,48 @@ namespace mirevo {
 namespace {
 
 TEST(FormatValueForPlaceholder, WritesByHandComputedTexts) {
-  const struct {
-    double value;
-    int width;
-    const char* expected;
-  } cases[] = {
-      // Zero, whole numbers, the trimming of zeros and of the point.
-      {0.0, 11, "          0"},
-      {-0.0, 3, "  0"},
-      {12, 11, "         12"},
-      {1000, 11, "       1000"},
-      {-12, 5, "  -12"},
-      {2.5, 11, "        2.5"},
-      {1, 2, " 1"},
-      // Digits that do not fit are cut, not rounded; a point may stay last.
-      {0.999999, 11, "9.99999E-01"},
-      {1.23456789, 5, "1.234"},
-      {1234.9, 5, "1234."},
-      {1999.9, 4, "E+03"},
-      {-998.76, 5, "-998."},
-      {-9998.5, 5, "-9998"},
-      // The limits 10^(w-1) - 1 and 1.
-      {99998, 6, " 99998"},
-      {99999, 6, "9.E+04"},
-      {100000, 6, "1.E+05"},
-      {1.0, 6, "     1"},
-      {0.5, 6, "5.E-01"},
-      {0.5, 5, "5E-01"},
-      {0.25, 6, "2.E-01"},
-      {0.25, 8, " 2.5E-01"},
-      // In single precision 1e8 - 1 is 1e8, so that 99999999.5 is still below the limit of nine columns.
-      {99999999.5, 9, "99999999."},
-      {100000000.0, 9, "   1.E+08"},
-      // Exponent form: one digit before the point, as many behind it as fit.
-      {123456.789, 6, "1.E+05"},
-      {1234567.89, 7, "1.2E+06"},
-      {-1234567.89, 7, "-1.E+06"},
-      {-123456.789, 7, "-123456"},
-      {1.5e-35, 11, "    1.5E-35"},
-      {1e-5, 11, "     1.E-05"},
-      {1.0 / 3.0, 20, "3.33333333333333E-01"},
-      {-1.0 / 3.0, 20, "-3.3333333333333E-01"},
-      {9.99999999999999e99, 20, "9.99999999999999E+99"},
-      // Three digits in the exponent do not fit the form; rounding may bring them about.
-      {1e100, 8, "*       "},
-      {9.999999999999999e99, 8, "*       "},
-      {-1e-100, 8, "*       "},
-      {5e-324, 8, "*       "},
-      {std::numeric_limits<double>::infinity(), 4, "*   "},
-      {std::numeric_limits<double>::quiet_NaN(), 4, "*   "},
-      // Wide fields.
-      {12, 23, "                  12   "},
-      {1e100, 22, "*                     "},
-      {0.5, 25, "              5.E-01     "},
-      {1e18, 20, " 1000000000000000000"},
-      {9.5e18, 20, " 9500000000000000000"},
-      // A sign without a column left for it: the exponent form, as the fixed one would lose a digit.
-      {-9.5e18, 20, "            -9.5E+18"},
-      {-1.0000000002e14, 15, "-1.00000000E+14"},
-      {1.0000000002e14, 15, "100000000020000"},
-      // Too narrow for an exponent part: unreadable, which the setup warns of.
-      {0.5, 3, "E-0"},
-      {0.5, 1, "E"},
-      {5, 0, ""},
-  };
-  for (const auto& [value, width, expected] : cases) {
-    EXPECT_EQ(FormatValueForPlaceholder(value, width), expected) << value << " in " << width;
+  // "value in width = 'text'", some on a line.
+  std::istringstream cases(R"(
+      # Zero, whole numbers, the trimming of zeros and of the point.
+      0.0 in 11 = '          0'; -0.0 in 3 = '  0'; 12 in 11 = '         12'; 1000 in 11 = '       1000'
+      -12 in 5 = '  -12'; 2.5 in 11 = '        2.5'; 1 in 2 = ' 1'
+      # Digits that do not fit are cut, not rounded; a point may stay last.
+      0.999999 in 11 = '9.99999E-01'; 1.23456789 in 5 = '1.234'; 1234.9 in 5 = '1234.'; 1999.9 in 4 = 'E+03'
+      -998.76 in 5 = '-998.'; -9998.5 in 5 = '-9998'
+      # The limits 10^(w-1) - 1 and 1.
+      99998 in 6 = ' 99998'; 99999 in 6 = '9.E+04'; 100000 in 6 = '1.E+05'; 1.0 in 6 = '     1'; 0.5 in 6 = '5.E-01'
+      0.5 in 5 = '5E-01'; 0.25 in 6 = '2.E-01'; 0.25 in 8 = ' 2.5E-01'
+      # In single precision 1e8 - 1 is 1e8, so that 99999999.5 is still below the limit of nine columns.
+      99999999.5 in 9 = '99999999.'; 100000000.0 in 9 = '   1.E+08'
+      # Exponent form: one digit before the point, as many behind it as fit.
+      123456.789 in 6 = '1.E+05'; 1234567.89 in 7 = '1.2E+06'; -1234567.89 in 7 = '-1.E+06'
+      -123456.789 in 7 = '-123456'; 1.5e-35 in 11 = '    1.5E-35'; 1e-5 in 11 = '     1.E-05'
+      0.3333333333333333 in 20 = '3.33333333333333E-01'; -0.3333333333333333 in 20 = '-3.3333333333333E-01'
+      9.99999999999999e99 in 20 = '9.99999999999999E+99'
+      # Three digits in the exponent do not fit the form; rounding may bring them about.
+      1e100 in 8 = '*       '; 9.999999999999999e99 in 8 = '*       '; -1e-100 in 8 = '*       '
+      5e-324 in 8 = '*       '; inf in 4 = '*   '; nan in 4 = '*   '
+      # Wide fields.
+      12 in 23 = '                  12   '; 1e100 in 22 = '*                     '
+      0.5 in 25 = '              5.E-01     '; 1e18 in 20 = ' 1000000000000000000'
+      9.5e18 in 20 = ' 9500000000000000000'
+      # A sign without a column left for it: the exponent form, as the fixed one would lose a digit.
+      -9.5e18 in 20 = '            -9.5E+18'; -1.0000000002e14 in 15 = '-1.00000000E+14'
+      1.0000000002e14 in 15 = '100000000020000'
+      # Too narrow for an exponent part: unreadable, which the setup warns of.
+      0.5 in 3 = 'E-0'; 0.5 in 1 = 'E'; 5 in 0 = '')");
+  int count = 0;
+  for (std::string line; std::getline(cases, line);) {
+    std::istringstream parts(line.find('#') == std::string::npos ? line : "");
+    for (std::string part; std::getline(parts, part, ';'); ++count) {
+      const auto text = part.find(" = '");
+      ASSERT_NE(text, std::string::npos) << part;
+      const int width = std::stoi(part.substr(part.find(" in ") + 4));
+      const std::string written = FormatValueForPlaceholder(std::strtod(part.c_str(), nullptr), width);
+      EXPECT_EQ(fmt::format(" = '{}'", written), part.substr(text));
+    }
   }
+  EXPECT_EQ(count, 49);
 }
 
 TEST(FormatValueForPlaceholder, ReadsBackWithinTheWidth) {

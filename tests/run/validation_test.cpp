@@ -94,6 +94,8 @@ const std::vector<Refused>& refusedValues() {
        "No scenario runs defined", ""},
       {"Option = 2 => 0 & 412.5, 1, 99 => 412.5, 1", "Invalid number of parameter values in SCENARIO_1",
        "each of the 3 parameters, found 2"},
+      {"Option = 2 => 0 & 412.5, 1, 99 => 412.5, 1, 99, 7", "Invalid number of parameter values in SCENARIO_1",
+       "each of the 3 parameters, found 4"},
       {"Option = 2 => 0 & 412.5, 1, 99 => 412.5, 1.01, 99", "Value for parameter Rate in SCENARIO_1 out of bounds",
        "value 2: expected 0 to 1, found 1.01"},
       {"Option = 2 => 1 & Sensitivity_Type = 0 => 1", "Invalid sensitivity type selection", "expected 0, found 1"},
