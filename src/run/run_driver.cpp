@@ -213,7 +213,7 @@ void RunDriver::openSeries() {
 }
 
 std::vector<std::string> RunDriver::closingLines(std::string_view terminationMessage) const {
-  std::vector<std::string> lines{std::string(terminationMessage)};
+  std::vector<std::string> lines{std::string(terminationMessage), "Ended: " + dateAndTimeNow()};
   if (!reporter_ || !reporter_->best()) return lines;
   const std::vector<std::string> scales = aggregator_->scaleLines();
   lines.insert(lines.end(), scales.begin(), scales.end());

@@ -213,7 +213,8 @@ void ReportBuilder::addEnding(const std::optional<RunEnding>& ending) {
     return;
   }
   run.message = table_.closingLines.front();
-  run.ended = timeOfFile(resultPath_);
+  run.ended = valueOf(table_.closingLines, "Ended: ");
+  if (run.ended.empty()) run.ended = timeOfFile(resultPath_);  // a signal leaves its message alone
   const std::string message = toLowerAscii(run.message);
   if (message.ends_with("simulation cancelled")) {
     run.state = RunStateShown::cancelled;

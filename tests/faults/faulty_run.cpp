@@ -25,16 +25,6 @@ std::string readFile(const fs::path& path) {
   return content.str();
 }
 
-/// Without what two runs of one setup may differ in.
-std::string withoutTimes(const std::string& text) {
-  std::string kept;
-  std::istringstream lines(text);
-  for (std::string line; std::getline(lines, line);) {
-    if (!line.starts_with("# Started:") && !line.starts_with("# Restarted:")) kept += line + '\n';
-  }
-  return kept;
-}
-
 std::string excerpt(const std::string& text) {
   return text.size() < 600 ? text : text.substr(0, 300) + " ... " + text.substr(text.size() - 300);
 }
@@ -133,7 +123,7 @@ RunningProgram FaultyRun::start(const Environment& environment, const std::vecto
 std::map<std::string, std::string> FaultyRun::outputs() const {
   std::map<std::string, std::string> found;
   for (const std::string& name : {std::string("calSimErr.dat"), std::string("basin_Band_1.csv"), resultFileName_}) {
-    if (folder_.exists(name)) found[name] = withoutTimes(folder_.read(name));
+    if (folder_.exists(name)) found[name] = withoutDates(folder_.read(name));
   }
   if (!folder_.exists("basin_Saved")) return found;
   for (const auto& entry : fs::recursive_directory_iterator(folder_ / "basin_Saved")) {

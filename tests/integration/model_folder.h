@@ -90,10 +90,16 @@ class ModelFolder : public TemporaryFolder {
 /// another order than they began.
 inline constexpr const char* kSleepByParameters = "sleep 0.0$(($(cksum <parameters.txt | cut -d ' ' -f 1) % 4))";
 
-/// Everything in a result file but when it was made.
-inline std::string withoutDate(const std::string& results) {
-  const auto start = results.find("# Started: ");
-  return start == std::string::npos ? results : results.substr(0, start) + results.substr(results.find('\n', start));
+/// Everything in a result file but when the run was started and ended.
+inline std::string withoutDates(const std::string& results) {
+  std::string kept;
+  std::istringstream lines(results);
+  for (std::string line; std::getline(lines, line);) {
+    const bool isDate =
+        line.starts_with("# Started: ") || line.starts_with("# Restarted: ") || line.starts_with("# Ended: ");
+    if (!isDate) kept += line + "\n";
+  }
+  return kept;
 }
 
 /// The rows of a result file, each split at its tabs, the header row first; and its `#` lines.

@@ -89,7 +89,7 @@ TEST_F(Mpi, AJobWritesTheResultsOfAPlainRun) {
     const ProgramResult job = runJob(c.processes, {setup});
     EXPECT_EQ(job.exitCode, 0) << job.error << log();
     EXPECT_EQ(job.output + job.error, "");
-    EXPECT_EQ(withoutDate(folder_.read(c.results)), withoutDate(plain));
+    EXPECT_EQ(withoutDates(folder_.read(c.results)), withoutDates(plain));
     EXPECT_EQ(occurrences(log(), "NoSimultaneousSim: taken as 1 on each worker"), c.jobSlots > 1 ? 1 : 0);
     EXPECT_EQ(folder_.read("basin_Series.dat"), series);
     EXPECT_THAT(log(), HasSubstr(fmt::format("MPI job: this master and {} workers", c.processes - 1)));

@@ -28,24 +28,29 @@ ProgramResult makeReport(const ModelFolder& folder, const std::string& setup = "
 TEST(Report, StandsBesideTheResultsHoweverARunEnds) {
   const struct {
     RunSettings settings;
+    const char* resultFile;
     int exitCode;
     std::vector<const char*> parts;
   } cases[] = {
       {{.maxEvaluations = 30},
+       "basin_Optimisation.dat",
        0,
        {R"("state":"finished","message":"Optimisation terminated: Maximum number of)",
         R"("evaluations":31,"planned":31)", R"({"name":"b","kind":"variable")", R"("start":1,"best":)",
         R"("series":[{"measure":"flow")", R"("step":86400000)", R"("figures":{"initial":{"n":365,"nse":)",
         R"("initialNumber":1,"initialLabel":"initial parameters")"}},
       {{.option = 0, .scenarios = {"5, 2, 1", "1, 2, 1"}, .modelArguments = "--fail-above 4.5"},
+       "basin.dat",
        1,
        {R"("state":"failed","message":"Error: Unable to continue. No of failed)", R"("failed":1)",
         R"("failures":[{"reason":"run.sh exited with code 3","count":1,"example":"Evaluation 1: run.sh)",
         R"("series":[])"}},
       {{.option = 1},
+       "basin_Sensitivity.dat",
        0,
        {R"("task":"sensitivity")", R"("derivatives":[[)", R"("covariance":{"names":["a","b"],"estimate":[4,1])"}},
       {{.option = 3, .maxEvaluations = 20},
+       "basin.dat",
        0,
        {R"("band":[{"measure":"flow","count":365,"start":"2001-01-01T00:00:00","step":86400000,"observed":[5,)",
         R"("initialLabel":"first evaluation")"}},
@@ -55,9 +60,13 @@ TEST(Report, StandsBesideTheResultsHoweverARunEnds) {
     EXPECT_EQ(runProgram({folder.writeSetup(c.settings)}).exitCode, c.exitCode);
     const std::string data = reportData(folder);
     for (const char* part : c.parts) EXPECT_THAT(data, HasSubstr(part));
-    // From the files alone the same comes out, but for the times.
+    // From the files alone the same comes out, but for the time of the report, whenever they were copied.
+    std::filesystem::last_write_time(folder / c.resultFile, {});
+    const std::string results = folder.read(c.resultFile);
+    const std::string ended = results.substr(results.find("\n# Ended: ") + 10, 19);
     EXPECT_EQ(makeReport(folder).exitCode, 0);
     const std::string again = reportData(folder);
+    EXPECT_THAT(again, HasSubstr(fmt::format(R"("ended":"{}")", ended)));
     EXPECT_EQ(again.substr(again.find("\"parameters\":")), data.substr(data.find("\"parameters\":")));
     const auto stateOf = [](const std::string& text) { return text.substr(text.find("\"state\""), 20); };
     EXPECT_EQ(stateOf(again), stateOf(data));

@@ -40,16 +40,6 @@ std::vector<std::string> sortedLines(const std::string& text) {
   return lines;
 }
 
-/// A result file without the lines that say when the run was started.
-std::string withoutDates(const std::string& results) {
-  std::string kept;
-  std::istringstream stream(results);
-  for (std::string line; std::getline(stream, line);) {
-    if (!line.starts_with("# Started: ") && !line.starts_with("# Restarted: ")) kept += line + "\n";
-  }
-  return kept;
-}
-
 class Restart : public ::testing::Test {
  protected:
   /// Writes a setup that goes on with what it finds.
