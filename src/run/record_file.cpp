@@ -27,7 +27,7 @@ std::string firstFreeName(const std::string& path, bool isFolder) {
   const std::size_t dot = path.rfind('.');
   const std::size_t stemEnd = isFolder || dot == std::string::npos || dot <= nameStart ? path.size() : dot;
   for (int number = 1;; ++number) {
-    const std::string name = fmt::format("{}.{}{}", path.substr(0, stemEnd), number, path.substr(stemEnd));
+    std::string name = fmt::format("{}.{}{}", path.substr(0, stemEnd), number, path.substr(stemEnd));
     struct stat status {};
     if (::lstat(name.c_str(), &status) == 0) continue;
     if (errno == ENOENT) return name;
