@@ -14,6 +14,7 @@ namespace mirevo {
 struct Individual {
   ParameterSet set;
   EvaluationResult result;
+  int failedMoves = 0;  ///< of PSE: moves of this point's step that have failed
 
   double value() const { return result.aggregate; }
 };

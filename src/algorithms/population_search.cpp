@@ -117,21 +117,6 @@ ParameterSet PopulationSearch::clampedToBounds(ParameterSet set) const {
   return set;
 }
 
-ParameterSet PopulationSearch::reflectedAtBounds(ParameterSet set) const {
-  for (std::size_t j = 0; j < set.size(); ++j) {
-    const double lower = problem_.bounds.lower[j];
-    const double upper = problem_.bounds.upper[j];
-    if (set[j] < lower) {
-      set[j] = 2.0 * lower - set[j];
-      if (set[j] > upper) set[j] = lower;
-    } else if (set[j] > upper) {
-      set[j] = 2.0 * upper - set[j];
-      if (set[j] < lower) set[j] = upper;
-    }
-  }
-  return set;
-}
-
 ParameterSet PopulationSearch::drawFrom(const Box& box) {
   ParameterSet set(box.lower.size());
   for (std::size_t j = 0; j < set.size(); ++j) {
@@ -141,12 +126,12 @@ ParameterSet PopulationSearch::drawFrom(const Box& box) {
   return set;
 }
 
-std::vector<std::size_t> PopulationSearch::drawSimplex(std::size_t count, std::size_t size) {
-  assert(count <= size);
-  // The i-th best of m weighs m + 1 − i; drawn members lose their weight. All sums are whole numbers and exact.
+std::vector<std::size_t> PopulationSearch::drawSimplex(std::size_t count, std::size_t size, std::size_t ranked) {
+  assert(count <= size && size <= ranked);
+  // Drawn members lose their weight. All sums are whole numbers and exact.
   std::vector<double> weights(size);
-  for (std::size_t i = 0; i < size; ++i) weights[i] = static_cast<double>(size - i);
-  double total = 0.5 * static_cast<double>(size) * static_cast<double>(size + 1);
+  for (std::size_t i = 0; i < size; ++i) weights[i] = static_cast<double>(ranked - i);
+  double total = std::accumulate(weights.begin(), weights.end(), 0.0);
   std::vector<std::size_t> places;
   places.reserve(count);
   while (places.size() < count) {

@@ -69,14 +69,11 @@ class PopulationSearch : public SearchAlgorithm {
   bool isWithinBounds(const ParameterSet& set) const;
   /// Puts a point that rounding may have carried past a bound back on it.
   ParameterSet clampedToBounds(ParameterSet set) const;
-  /// Reflects coordinates outside the bounds at them; what then lies beyond the opposite bound is put on the bound that
-  /// was violated first.
-  ParameterSet reflectedAtBounds(ParameterSet set) const;
   /// A uniformly random point of a box.
   ParameterSet drawFrom(const Box& box);
-  /// Places of `count` distinct members out of `size` that are sorted best first, drawn one after the other with the
-  /// triangular probability 2(m+1−i)/(m(m+1)) of the i-th best; returned in ascending order.
-  std::vector<std::size_t> drawSimplex(std::size_t count, std::size_t size);
+  /// Places of `count` distinct members out of the best `size` of m = `ranked` that are sorted best first, drawn one
+  /// after the other, the i-th best with a probability proportional to m + 1 − i; returned in ascending order.
+  std::vector<std::size_t> drawSimplex(std::size_t count, std::size_t size, std::size_t ranked);
 
   Population population_;
 

@@ -8,19 +8,22 @@
 
 namespace mirevo {
 
-/// Population Simplex Evolution: the moves of SCE on one population without complexes, a whole generation in one batch.
+/// Population Simplex Evolution: the step of SCE made by all points of one population at once, a whole generation in
+/// one batch.
 ///
-/// A loop, one generation, makes an offspring of every point u of the population. It draws q − 1 distinct points better
-/// than u, better ones more often (for the few best, of which there are too few, any others); with their centroid g the
-/// offspring is
-///   with `reflectionProbability` the reflection g − a·(u − g), which takes u's place when better;
-///   with `contractionProbability` the contraction g + c·(u − g), which takes u's place when better;
-///   else a mutation, a random point of the simplex's box widened by a twentieth of its width on either side, always
-///   taken but for the best point, which it takes the place of only when better: it keeps the population from
-///   collapsing too soon.
-/// Coordinates outside the bounds are reflected at them. a and c are those of SCE. The best point never worsens.
-/// With a surrogate model the most promising of several offspring of every point is run; where the model fitted around
-/// the best point predicts least is run in place of the worst point's. What the alternatives cost is measured in
+/// A loop, one generation, makes as many offspring as the population has points. The best q − 1 points stay as they
+/// are; every other point u has an offspring, and the q − 1 worst have two. For each, q − 1 distinct points better than
+/// u are drawn, the i-th best of the population's N with a probability proportional to N + 1 − i, as SCE draws those of
+/// a simplex of which u is the worst. Let g be their centroid. The step of a point, spread over generations, is
+///   the reflection g − a·(u − g);
+///   when it has failed the contraction g + c·(u − g);
+///   when both have failed a mutation, taken even when worse: u has got stuck.
+/// The offspring is the move of the step that is due with `reflectionProbability`, a contraction at once with
+/// `contractionProbability`, else a mutation at once; it takes the place of u when better. A new point begins a step.
+/// A mutation is normally distributed about g, in every parameter on its own: that brings back the directions that the
+/// linear moves lose. It also stands in for a reflection outside the bounds. a and c are those of SCE.
+/// With a surrogate model the most promising of several offspring of a point is run; where the model fitted around the
+/// best point predicts least is run in place of one of the worst point's. What the alternatives cost is measured in
 /// docs/algorithms/pse.md and docs/algorithms/surrogate.md.
 class Pse final : public PopulationSearch {
  public:
@@ -29,17 +32,21 @@ class Pse final : public PopulationSearch {
  private:
   struct Offspring {
     ParameterSet set;
-    std::size_t parent = 0;  ///< place of u in the population
-    bool isMutation = false;
+    std::size_t parent = 0;      ///< place of u in the population
+    int failedMoves = 0;         ///< of the parent's step once this offspring has failed
+    bool isTakenAnyway = false;  ///< even when worse than u
   };
 
   bool areSettingsValid() const override;
   std::size_t populationSize() const override { return static_cast<std::size_t>(settings_.populationSize); }
   void makeLoop() override;
 
+  std::vector<std::size_t> chooseParents() const;
   std::vector<std::size_t> drawOthers(std::size_t parent);
   Offspring makeOffspring(std::size_t parent);
   Offspring mostPromisingOffspring(std::size_t parent);
+  ParameterSet reflection(std::size_t parent, std::span<const std::size_t> others, std::span<const double> g);
+  ParameterSet mutation(std::size_t parent, std::span<const std::size_t> others, std::span<const double> g);
   void replaceParents(std::span<const Offspring> offspring, std::span<const ParameterSet> proposals);
 
   PseSettings settings_;

@@ -51,7 +51,7 @@ void Sce::makeEvolutionStep() {
 
 Sce::Subcomplex Sce::drawSubcomplex(const Complex& complex) {
   const std::vector<std::size_t> places =
-      drawSimplex(static_cast<std::size_t>(simplex_.pointCount), complex.points.size());
+      drawSimplex(static_cast<std::size_t>(simplex_.pointCount), complex.points.size(), complex.points.size());
   return {places.back(), centroid(complex.points, std::span(places).first(places.size() - 1))};
 }
 

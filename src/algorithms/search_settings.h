@@ -32,8 +32,8 @@ struct SceSettings {
 
 struct PseSettings {
   std::int32_t populationSize = 50;
-  double reflectionProbability = 0.5;
-  double contractionProbability = 0.15;  ///< what is left to 1 is the probability of a mutation
+  double reflectionProbability = 0.7;   ///< of the move that is due, at first a reflection
+  double contractionProbability = 0.0;  ///< of a contraction at once; what is left to 1 is that of a mutation at once
 };
 
 struct DdsSettings {

@@ -263,5 +263,28 @@ TEST(Pse, RunsAGenerationInOneBatchAndKeepsItsBestPoint) {
   EXPECT_THAT(sizes, ::testing::ElementsAre(22, 22, 22, 22, 12));
 }
 
+/// Every new point is worse than the sample, so that the step of the worst point goes on from move to move.
+TEST(Pse, ReflectsThenContractsAndGivesAStuckPointUp) {
+  int count = 0;
+  FunctionEvaluator counting([&count](const ParameterSet&) { return resultOf(++count); });
+  UniformGenerator random(1);
+  const std::vector<ParameterSet> given{{5, 5}, {6, 5}, {5, 7}};
+  InitialSampleSettings fromFile;
+  fromFile.includeInitialParameters = false;
+  fromFile.generation = 4;
+  Pse pse({3, 1.0, 0.0}, {3}, {{{0, 0}, {20, 20}, {0, 0}}, onBudget(100), fromFile, given, counting, random});
+  ASSERT_EQ(pse.initialise(), kSearchOk);
+  for (int loop = 0; loop < 3; ++loop) ASSERT_EQ(pse.advance(), kSearchOk);
+  // The best point stays; its turn goes to the worst one, whose offspring are the last two of a batch.
+  ASSERT_EQ(counting.batches.size(), 4U);
+  const ParameterSet contracted{5.5 - 0.4 * 0.5, 5 + 0.4 * 2};
+  for (const std::size_t offspring : {1U, 2U}) {
+    EXPECT_THAT(counting.batches[1][offspring], ::testing::ElementsAre(6, 3));
+    EXPECT_THAT(counting.batches[2][offspring], ::testing::Pointwise(::testing::DoubleEq(), contracted));
+  }
+  EXPECT_THAT(pse.population().back().set, ::testing::Not(::testing::ElementsAre(5, 7)));
+  EXPECT_THAT(pse.population().front().set, ::testing::ElementsAre(5, 5));
+}
+
 }  // namespace
 }  // namespace mirevo
