@@ -23,7 +23,6 @@ using testing::TargetEvaluator;
 using testing::TestFunction;
 
 constexpr int kTrials = 100;
-constexpr int kSurrogateTrials = 20;
 constexpr int kSuccessBudget = 25000;
 constexpr int kSurrogateBudget = 2000;
 
@@ -51,7 +50,7 @@ Outcome runTrial(const TestFunction& function, const Setting& setting, int seed)
   UniformGenerator random(seed);
   const SearchBounds bounds = testing::boundsOf(function);
   const int n = static_cast<int>(function.size());
-  const SurrogateSettings surrogate{setting.samplingRate, (n + 1) * (n + 2), setting.modelType, 2};
+  const SurrogateSettings surrogate{.samplingRate = setting.samplingRate, .modelType = setting.modelType};
   ProposalSelector selector(surrogate, bounds);
   // The test of the objective's change is switched off by a history that is never filled.
   const StoppingCriteria stopping{setting.budget, 1000000000, 0.0};
@@ -168,8 +167,7 @@ void printSmallComplexes() {
 }
 
 void printSurrogate() {
-  fmt::print("\nSuccesses of {} / mean evaluations of the successful, shifted optimum, 4 complexes\n\n",
-             kSurrogateTrials);
+  fmt::print("\nSuccesses of {} / mean evaluations of the successful, shifted optimum, 4 complexes\n\n", kTrials);
   fmt::print("| function | search | alone | quadratic 50 % | quadratic 25 % | Gaussian 50 % | Gaussian 25 % |\n");
   fmt::print("|---|---|---|---|---|---|---|\n");
   for (const std::string name : {"Goldstein-Price 2-D", "Rosenbrock 2-D", "Six-hump camel-back 2-D", "Rastrigin 2-D",
@@ -179,7 +177,7 @@ void printSurrogate() {
       fmt::print("| {} | {} |", name, method == Method::sce ? "SCE" : "PSE");
       for (const auto& [rate, model] : {std::pair{100, 0}, {50, 0}, {25, 0}, {50, 1}, {25, 1}}) {
         const Setting setting{method, 4, kSurrogateBudget, rate, model, true};
-        fmt::print(" {} |", successText(runTrials(function, setting, true, kSurrogateTrials)));
+        fmt::print(" {} |", successText(runTrials(function, setting, true, kTrials)));
       }
       fmt::print("\n");
     }

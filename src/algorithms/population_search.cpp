@@ -98,9 +98,11 @@ std::vector<std::size_t> PopulationSearch::mostPromising(std::span<const Paramet
   return places;
 }
 
-std::optional<ParameterSet> PopulationSearch::predictedMinimum(const Individual& centre) {
-  if (!isSelecting()) return std::nullopt;
-  return problem_.selector->minimiser(centre.set);
+std::vector<PredictedMinimum> PopulationSearch::predictedMinima(std::span<const Individual> centres) {
+  if (!isSelecting()) return {};
+  std::vector<ParameterSet> sets;
+  for (const Individual& centre : centres) sets.push_back(centre.set);
+  return problem_.selector->minima(sets);
 }
 
 bool PopulationSearch::isWithinBounds(const ParameterSet& set) const {

@@ -15,6 +15,7 @@
 namespace mirevo {
 
 class ProposalSelector;
+struct PredictedMinimum;
 
 /// What a population search works on. The references must outlive the search.
 struct SearchProblem {
@@ -59,9 +60,9 @@ class PopulationSearch : public SearchAlgorithm {
   std::size_t proposalsPerRun() const;
   /// Places of the `count` most promising proposals, in ascending order.
   std::vector<std::size_t> mostPromising(std::span<const ParameterSet> proposals, std::size_t count);
-  /// Where the surrogate model fitted around `centre` predicts least; nothing where it is not in
-  /// use, or where that has been run already.
-  std::optional<ParameterSet> predictedMinimum(const Individual& centre);
+  /// Where the surrogate model fitted around each of `centres` predicts least; nothing where it is not in use, or where
+  /// that has been run already.
+  std::vector<PredictedMinimum> predictedMinima(std::span<const Individual> centres);
   bool isBudgetUsedUp() const { return summary_.evaluationCount >= problem_.stopping.maxEvaluations; }
 
   const SearchBounds& bounds() const { return problem_.bounds; }

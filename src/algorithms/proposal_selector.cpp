@@ -24,7 +24,10 @@ std::unique_ptr<SurrogateModel> makeModel(int type) {
 }  // namespace
 
 ProposalSelector::ProposalSelector(const SurrogateSettings& settings, SearchBounds bounds)
-    : settings_(settings), bounds_(std::move(bounds)), model_(makeModel(settings.modelType)) {}
+    : settings_(settings), bounds_(std::move(bounds)), model_(makeModel(settings.modelType)) {
+  if (settings_.neighbourhoodSize > 0) return;
+  settings_.neighbourhoodSize = static_cast<std::int32_t>(3 * quadraticCoefficientCount(bounds_.size()) / 2);
+}
 
 std::vector<double> ProposalSelector::scaled(const ParameterSet& set) const {
   std::vector<double> point(set.size());
@@ -42,8 +45,10 @@ void ProposalSelector::note(const ParameterSet& set, const EvaluationResult& res
 }
 
 bool ProposalSelector::isActive(int loop) const {
+  const std::size_t n = bounds_.size();
   // Fewer points than a plane needs say nothing about the shape of the objective.
-  return loop >= settings_.initialGenerations && points_.size() >= bounds_.size() + 2;
+  const std::size_t least = settings_.modelType == 0 ? quadraticCoefficientCount(n) : n + 2;
+  return loop >= settings_.initialGenerations && points_.size() >= least;
 }
 
 std::size_t ProposalSelector::proposalsPerRun() const {
@@ -97,32 +102,45 @@ std::vector<double> ProposalSelector::predict(std::span<const ParameterSet> prop
   return predictions;
 }
 
-std::optional<ParameterSet> ProposalSelector::minimiser(const ParameterSet& centre) {
-  const std::vector<double> start = scaled(centre);
-  const std::vector<std::size_t> neighbours = nearest(start);
-  if (!fitTo(neighbours)) return std::nullopt;
-  Box box{start, start};
+/// `box` becomes that of the points to which the model is fitted.
+std::vector<double> ProposalSelector::minimumAround(const std::vector<double>& centre, Box& box) {
+  const std::vector<std::size_t> neighbours = nearest(centre);
+  if (!fitTo(neighbours)) return {};
+  box = {centre, centre};
   for (const std::size_t place : neighbours) {
-    for (std::size_t j = 0; j < start.size(); ++j) {
+    for (std::size_t j = 0; j < centre.size(); ++j) {
       box.lower[j] = std::min(box.lower[j], points_[place][j]);
       box.upper[j] = std::max(box.upper[j], points_[place][j]);
     }
   }
-  const auto predicted = [&](const std::vector<double>& point) { return model_->predict(point); };
-  const std::vector<double> found = patternSearch(predicted, start, box);
-  const auto isFound = [&](std::size_t place) {
-    for (std::size_t j = 0; j < found.size(); ++j) {
-      if (std::abs(found[j] - points_[place][j]) > kSamePlace * (box.upper[j] - box.lower[j])) return false;
+  return patternSearch([&](const std::vector<double>& point) { return model_->predict(point); }, centre, box);
+}
+
+std::vector<PredictedMinimum> ProposalSelector::minima(std::span<const ParameterSet> centres) {
+  std::vector<PredictedMinimum> found;
+  std::vector<std::vector<double>> foundPoints;
+  for (std::size_t centre = 0; centre < centres.size(); ++centre) {
+    Box box;
+    std::vector<double> minimum = minimumAround(scaled(centres[centre]), box);
+    const auto isSamePlace = [&](const std::vector<double>& point) {
+      for (std::size_t j = 0; j < minimum.size(); ++j) {
+        if (std::abs(minimum[j] - point[j]) > kSamePlace * (box.upper[j] - box.lower[j])) return false;
+      }
+      return true;
+    };
+    if (minimum.empty() || std::any_of(points_.begin(), points_.end(), isSamePlace) ||
+        std::any_of(foundPoints.begin(), foundPoints.end(), isSamePlace)) {
+      continue;
     }
-    return true;
-  };
-  if (std::any_of(neighbours.begin(), neighbours.end(), isFound)) return std::nullopt;
-  ParameterSet set(found.size());
-  for (std::size_t j = 0; j < set.size(); ++j) {
-    const double value = bounds_.lower[j] + found[j] * (bounds_.upper[j] - bounds_.lower[j]);
-    set[j] = std::clamp(value, bounds_.lower[j], bounds_.upper[j]);
+    ParameterSet set(minimum.size());
+    for (std::size_t j = 0; j < set.size(); ++j) {
+      const double value = bounds_.lower[j] + minimum[j] * (bounds_.upper[j] - bounds_.lower[j]);
+      set[j] = std::clamp(value, bounds_.lower[j], bounds_.upper[j]);
+    }
+    found.push_back({std::move(set), centre});
+    foundPoints.push_back(std::move(minimum));
   }
-  return set;
+  return found;
 }
 
 std::vector<std::size_t> ProposalSelector::select(std::span<const ParameterSet> proposals, std::size_t count) {

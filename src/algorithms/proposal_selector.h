@@ -2,7 +2,6 @@
 
 #include <cstddef>
 #include <memory>
-#include <optional>
 #include <span>
 #include <vector>
 
@@ -12,6 +11,12 @@
 #include "algorithms/surrogate_model.h"
 
 namespace mirevo {
+
+/// Where a surrogate model predicts least around one of the points that it was asked about.
+struct PredictedMinimum {
+  ParameterSet set;
+  std::size_t centre = 0;  ///< place of that point among those asked about
+};
 
 /// Chooses with a surrogate model which proposals of a search are worth a model run. It keeps every evaluated point; a
 /// proposal is predicted by a model fitted to the `neighbourhoodSize` evaluated points nearest to it, distances taken
@@ -32,13 +37,15 @@ class ProposalSelector final {
   /// the first `count`.
   std::vector<std::size_t> select(std::span<const ParameterSet> proposals, std::size_t count);
 
-  /// Where the model fitted around `centre` predicts least within the box of the points that it is fitted to, as in a
-  /// step of a trust region. Nothing where no model can be fitted, nor where a point as good as there has been
-  /// evaluated.
-  std::optional<ParameterSet> minimiser(const ParameterSet& centre);
+  /// For each of `centres` where the model fitted around it predicts least within the box of the points that it is
+  /// fitted to, as in a step of a trust region. Left out is a centre around which no model can be fitted, and a
+  /// minimum where a point as good as there has been evaluated or is returned for an earlier centre.
+  std::vector<PredictedMinimum> minima(std::span<const ParameterSet> centres);
 
  private:
   std::vector<double> scaled(const ParameterSet& set) const;
+  /// In coordinates relative to the bounds; empty where no model can be fitted.
+  std::vector<double> minimumAround(const std::vector<double>& centre, Box& box);
   /// Fits the model to the points at `places`; false when it cannot be fitted.
   bool fitTo(std::span<const std::size_t> places);
   /// Predictions, one a proposal; empty when no model can be fitted.

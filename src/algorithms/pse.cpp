@@ -2,8 +2,10 @@
 
 #include <algorithm>
 #include <cmath>
+#include <iterator>
 #include <utility>
 
+#include "algorithms/proposal_selector.h"
 #include "algorithms/special_functions.h"
 
 namespace mirevo {
@@ -12,6 +14,9 @@ namespace {
 /// Standard deviation of a mutation, in those of the simplex. With 1 the test functions take up to a tenth more
 /// evaluations; with 0.8 small populations collapse.
 constexpr double kMutationSpread = 0.9;
+
+/// With a surrogate model: of a generation one run in so many goes to its predicted minima.
+constexpr std::size_t kPointsPerMinimum = 4;
 
 constexpr int kReflectionFailed = 1;
 constexpr int kContractionFailed = 2;
@@ -31,14 +36,23 @@ bool Pse::areSettingsValid() const {
 void Pse::makeLoop() {
   std::vector<Offspring> offspring;
   for (const std::size_t parent : chooseParents()) offspring.push_back(mostPromisingOffspring(parent));
-  if (std::optional<ParameterSet> minimum = predictedMinimum(population_.front())) {
-    offspring.pop_back();
-    offspring.insert(offspring.begin(), Offspring{std::move(*minimum), population_.size() - 1});
-  }
+  proposePredictedMinima(offspring);
   std::vector<ParameterSet> proposals;
   proposals.reserve(offspring.size());
   for (const Offspring& child : offspring) proposals.push_back(child.set);
   replaceParents(offspring, proposals);
+}
+
+/// With a surrogate model, runs where it predicts least around each of the best points take the place of the last
+/// offspring. They replace those points when better: the bad points stay where they are, and the population spread.
+void Pse::proposePredictedMinima(std::vector<Offspring>& offspring) {
+  const std::size_t most = std::max(population_.size() / kPointsPerMinimum, std::size_t{1});
+  std::vector<PredictedMinimum> minima = predictedMinima(std::span(population_).first(most));
+  offspring.resize(offspring.size() - minima.size());
+  std::vector<Offspring> refinements;
+  for (PredictedMinimum& minimum : minima) refinements.push_back({std::move(minimum.set), minimum.centre});
+  offspring.insert(offspring.begin(), std::make_move_iterator(refinements.begin()),
+                   std::make_move_iterator(refinements.end()));
 }
 
 /// The parents of a generation, best first: what a budget cuts off are the offspring of the worst. The best points have

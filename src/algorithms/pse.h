@@ -22,9 +22,9 @@ namespace mirevo {
 /// `contractionProbability`, else a mutation at once; it takes the place of u when better. A new point begins a step.
 /// A mutation is normally distributed about g, in every parameter on its own: that brings back the directions that the
 /// linear moves lose. It also stands in for a reflection outside the bounds. a and c are those of SCE.
-/// With a surrogate model the most promising of several offspring of a point is run; where the model fitted around the
-/// best point predicts least is run in place of one of the worst point's. What the alternatives cost is measured in
-/// docs/algorithms/pse.md and docs/algorithms/surrogate.md.
+/// With a surrogate model the most promising of several offspring of a point is run; a quarter of the
+/// generation is run where the model predicts least around each of the best points. What the alternatives cost is
+/// measured in docs/algorithms/pse.md and docs/algorithms/surrogate.md.
 class Pse final : public PopulationSearch {
  public:
   Pse(const PseSettings& settings, const SimplexSettings& simplex, SearchProblem problem);
@@ -47,6 +47,7 @@ class Pse final : public PopulationSearch {
   Offspring mostPromisingOffspring(std::size_t parent);
   ParameterSet reflection(std::size_t parent, std::span<const std::size_t> others, std::span<const double> g);
   ParameterSet mutation(std::size_t parent, std::span<const std::size_t> others, std::span<const double> g);
+  void proposePredictedMinima(std::vector<Offspring>& offspring);
   void replaceParents(std::span<const Offspring> offspring, std::span<const ParameterSet> proposals);
 
   PseSettings settings_;

@@ -12,7 +12,7 @@ std::vector<double> QuadraticSurrogate::terms(std::span<const double> point) con
   std::vector<double> scaled(n);
   for (std::size_t j = 0; j < n; ++j) scaled[j] = width_[j] > 0.0 ? (point[j] - centre_[j]) / width_[j] : 0.0;
   std::vector<double> result{1.0};
-  result.reserve((n + 1) * (n + 2) / 2);
+  result.reserve(quadraticCoefficientCount(n));
   result.insert(result.end(), scaled.begin(), scaled.end());
   for (std::size_t j = 0; j < n; ++j) {
     for (std::size_t k = j; k < n; ++k) result.push_back(scaled[j] * scaled[k]);
@@ -33,7 +33,7 @@ bool QuadraticSurrogate::fit(std::span<const std::vector<double>> points, std::s
     for (std::size_t j = 0; j < n; ++j) width_[j] = std::max(width_[j], std::abs(point[j] - centre_[j]));
   }
 
-  const std::size_t size = (n + 1) * (n + 2) / 2;
+  const std::size_t size = quadraticCoefficientCount(n);
   std::vector<double> normal(size * size, 0.0);  // the lower triangle of XᵀX
   std::vector<double> moments(size, 0.0);        // Xᵀy
   for (std::size_t i = 0; i < points.size(); ++i) {

@@ -1,8 +1,17 @@
 #pragma once
 
+#include <cstddef>
+#include <span>
+#include <vector>
+
 #include "algorithms/surrogate_model.h"
 
 namespace mirevo {
+
+/// Coefficients of a full quadratic polynomial in n parameters.
+constexpr std::size_t quadraticCoefficientCount(std::size_t n) {
+  return (n + 1) * (n + 2) / 2;
+}
 
 /// The full quadratic polynomial in n parameters, (n+1)(n+2)/2 coefficients, by least squares. A small ridge keeps it
 /// defined where the points do not determine every coefficient.

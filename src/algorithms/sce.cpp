@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <utility>
 
+#include "algorithms/proposal_selector.h"
+
 namespace mirevo {
 Sce::Sce(const SceSettings& settings, const SimplexSettings& simplex, SearchProblem problem)
     : PopulationSearch(std::move(problem)), settings_(settings), simplex_(simplex) {}
@@ -20,7 +22,7 @@ void Sce::makeLoop() {
   dealIntoComplexes();
   for (int step = 0; step < settings_.evolutionSteps && !isBudgetUsedUp(); ++step) {
     for (Complex& complex : complexes_) chooseSubcomplex(complex);
-    if (step == 0) proposePredictedMinimum(complexes_.front());
+    proposePredictedMinimum(complexes_.front());
     makeEvolutionStep();
   }
   shuffle();
@@ -69,17 +71,20 @@ void Sce::chooseSubcomplex(Complex& complex) {
   }
   const std::size_t chosen = mostPromising(proposals, 1).front();
   complex.isMoved = false;
+  complex.isFirstPredicted = false;
   complex.current = std::move(drawn[chosen / 2]);
   complex.first = std::move(proposals[chosen]);
   complex.second = chosen % 2 == 0 ? contraction(complex) : std::move(proposals[chosen - 1]);
 }
 
 /// With a surrogate model the complex that holds the best point tries first where the model predicts least, and what it
-/// would have tried first comes second.
+/// would have tried first comes second. A minimum better than the best point takes that one's place: it says much about
+/// the valley, and nothing about the rest of the complex, which a worst point less would draw together.
 void Sce::proposePredictedMinimum(Complex& complex) {
-  std::optional<ParameterSet> minimum = predictedMinimum(complex.points.front());
-  if (!minimum) return;
-  complex.second = std::exchange(complex.first, std::move(*minimum));
+  std::vector<PredictedMinimum> minima = predictedMinima(std::span(complex.points).first(1));
+  if (minima.empty()) return;
+  complex.second = std::exchange(complex.first, std::move(minima.front().set));
+  complex.isFirstPredicted = true;
 }
 
 /// Evaluates one proposal of every complex that has not moved yet, in one batch.
@@ -93,12 +98,16 @@ void Sce::tryProposals(Proposal propose, Acceptance acceptance) {
   }
   std::vector<std::optional<EvaluationResult>> results = evaluate(proposals);
   for (std::size_t i = 0; i < proposers.size(); ++i) {
-    Individual& worst = proposers[i]->points[proposers[i]->current.worst];
     if (!results[i]) continue;
+    Complex& complex = *proposers[i];
+    Individual& best = complex.points.front();
+    Individual& worst = complex.points[complex.current.worst];
     const bool isTakenAnyway = acceptance == Acceptance::always && isUsable(*results[i]);
     if (!isTakenAnyway && !isBetter(results[i]->aggregate, worst.value())) continue;
-    worst = {std::move(proposals[i]), std::move(*results[i])};
-    proposers[i]->isMoved = true;
+    const bool isRefined =
+        propose == &Sce::firstProposal && complex.isFirstPredicted && isBetter(results[i]->aggregate, best.value());
+    (isRefined ? best : worst) = {std::move(proposals[i]), std::move(*results[i])};
+    complex.isMoved = true;
   }
 }
 

@@ -19,10 +19,10 @@ namespace mirevo {
 /// The paper has a = 1 and c = 1/2. Here a = 0.75 + 0.5/n (at most 1) and c = 0.45 − 0.1/n, which found the optima of
 /// the test functions as surely with about a seventh fewer evaluations (docs/algorithms/sce.md).
 /// With a surrogate model a complex looks at reflections and contractions of several subcomplexes, runs the most
-/// promising one first and its counterpart next, and of several random points runs the most promising. Once a loop the
-/// complex of the best point begins with the place where the model predicts least.
-/// As complexes are independent of each other between two shuffles they advance in step, and the batch of a step holds
-/// the current proposal of every complex. Points, values and random numbers do not depend on how the batch is run.
+/// promising one first and its counterpart next, and of several random points runs the most promising. In every step
+/// the complex of the loop's best point begins where the model predicts least around the best point of that complex. As
+/// complexes are independent of each other between two shuffles they advance in step, and the batch of a step holds the
+/// current proposal of every complex. Points, values and random numbers do not depend on how the batch is run.
 class Sce final : public PopulationSearch {
  public:
   Sce(const SceSettings& settings, const SimplexSettings& simplex, SearchProblem problem);
@@ -37,9 +37,10 @@ class Sce final : public PopulationSearch {
   struct Complex {
     Population points;
     Subcomplex current;
-    ParameterSet first;    ///< reflection, or contraction where a surrogate model prefers it
-    ParameterSet second;   ///< the other of the two
-    bool isMoved = false;  ///< whether this step has replaced u
+    ParameterSet first;             ///< reflection, or contraction where a surrogate model prefers it
+    ParameterSet second;            ///< the other of the two
+    bool isFirstPredicted = false;  ///< whether `first` is where a surrogate model predicts least
+    bool isMoved = false;           ///< whether this step has replaced a point
   };
   /// A way to propose a point to replace u; the step tries them one after the other.
   using Proposal = ParameterSet (Sce::*)(const Complex&);

@@ -6,6 +6,7 @@
 #include <fmt/format.h>
 
 #include "algorithms/local_sensitivity.h"
+#include "algorithms/quadratic_surrogate.h"
 #include "common/fatal_error.h"
 #include "common/text.h"
 #include "measures/dates.h"
@@ -236,8 +237,10 @@ void validateSurrogateControl(const OptimisationConfig& optimisation, std::size_
   const SurrogateSettings& surrogate = optimisation.surrogate;
   section.check("Model_Type", surrogate.modelType, "Error: Invalid model type for surrogate modelling optimisation");
   section.check("Neighbourhood_Size", surrogate.neighbourhoodSize, kNeighbourhood);
-  const std::size_t coefficientCount = (variableCount + 1) * (variableCount + 2) / 2;
-  if (surrogate.modelType == 0 && static_cast<std::size_t>(surrogate.neighbourhoodSize) < coefficientCount) {
+  const std::size_t coefficientCount = quadraticCoefficientCount(variableCount);
+  const bool isNeighbourhoodGiven = surrogate.neighbourhoodSize > 0;
+  if (isNeighbourhoodGiven && surrogate.modelType == 0 &&
+      static_cast<std::size_t>(surrogate.neighbourhoodSize) < coefficientCount) {
     section.refuse(kNeighbourhood, "Neighbourhood_Size",
                    fmt::format("expected at least the {} coefficients of a quadratic polynomial in {} parameters, "
                                "found {}",

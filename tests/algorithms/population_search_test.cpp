@@ -185,7 +185,7 @@ TEST_P(EitherSearch, RefusesStepsAndSettingsThatMakeNoSense) {
 TEST_P(EitherSearch, IsHelpedByTheSurrogateModelWithinTheSameBudgetAndRules) {
   for (const int type : {0, 1}) {
     FunctionEvaluator evaluator([](const ParameterSet& x) { return resultOf(testing::rosenbrock(x)); });
-    UniformGenerator random(2);
+    UniformGenerator random(3);
     const SearchBounds bounds{{-5, -2}, {5, 8}, {0, 0}};
     ProposalSelector selector({25, 12, type, 1}, bounds);
     const auto search = makeSearch(GetParam(), 4, {bounds, onBudget(400), {}, {}, evaluator, random, &selector});

@@ -44,7 +44,9 @@ TEST(KeywordTable, DefaultsAreThoseOfTheSettings) {
   EXPECT_EQ(read.pse.contractionProbability, own.pse.contractionProbability);
   EXPECT_EQ(read.stopping.loopsConvergence, own.stopping.loopsConvergence);
   EXPECT_EQ(read.stopping.minChange, own.stopping.minChange);
+  EXPECT_EQ(read.surrogate.samplingRate, own.surrogate.samplingRate);
   EXPECT_EQ(read.surrogate.neighbourhoodSize, own.surrogate.neighbourhoodSize);
+  EXPECT_EQ(read.surrogate.initialGenerations, own.surrogate.initialGenerations);
   EXPECT_EQ(read.initialSample.generation, own.initialSample.generation);
 }
 
