@@ -23,6 +23,7 @@ using testing::TargetEvaluator;
 using testing::TestFunction;
 
 constexpr int kTrials = 100;
+constexpr int kSurrogateTrials = 20;
 constexpr int kSuccessBudget = 25000;
 constexpr int kSurrogateBudget = 2000;
 
@@ -167,7 +168,8 @@ void printSmallComplexes() {
 }
 
 void printSurrogate() {
-  fmt::print("\nSuccesses of {} / mean evaluations of the successful, shifted optimum, 4 complexes\n\n", kTrials);
+  fmt::print("\nSuccesses of {} / mean evaluations of the successful, shifted optimum, 4 complexes\n\n",
+             kSurrogateTrials);
   fmt::print("| function | search | alone | quadratic 50 % | quadratic 25 % | Gaussian 50 % | Gaussian 25 % |\n");
   fmt::print("|---|---|---|---|---|---|---|\n");
   for (const std::string name : {"Goldstein-Price 2-D", "Rosenbrock 2-D", "Six-hump camel-back 2-D", "Rastrigin 2-D",
@@ -177,7 +179,7 @@ void printSurrogate() {
       fmt::print("| {} | {} |", name, method == Method::sce ? "SCE" : "PSE");
       for (const auto& [rate, model] : {std::pair{100, 0}, {50, 0}, {25, 0}, {50, 1}, {25, 1}}) {
         const Setting setting{method, 4, kSurrogateBudget, rate, model, true};
-        fmt::print(" {} |", successText(runTrials(function, setting, true, kTrials)));
+        fmt::print(" {} |", successText(runTrials(function, setting, true, kSurrogateTrials)));
       }
       fmt::print("\n");
     }

@@ -16,6 +16,9 @@ namespace {
 /// nothing.
 constexpr double kSamePlace = 1.0e-3;
 
+/// Of a Gaussian process: the time for a fit grows with the third power of the neighbourhood.
+constexpr std::size_t kMostNeighbours = 100;
+
 std::unique_ptr<SurrogateModel> makeModel(int type) {
   if (type == 1) return std::make_unique<GaussianProcess>();
   return std::make_unique<QuadraticSurrogate>();
@@ -26,7 +29,9 @@ std::unique_ptr<SurrogateModel> makeModel(int type) {
 ProposalSelector::ProposalSelector(const SurrogateSettings& settings, SearchBounds bounds)
     : settings_(settings), bounds_(std::move(bounds)), model_(makeModel(settings.modelType)) {
   if (settings_.neighbourhoodSize > 0) return;
-  settings_.neighbourhoodSize = static_cast<std::int32_t>(3 * quadraticCoefficientCount(bounds_.size()) / 2);
+  const std::size_t coefficients = quadraticCoefficientCount(bounds_.size());
+  settings_.neighbourhoodSize = static_cast<std::int32_t>(
+      settings_.modelType == 1 ? std::min(3 * coefficients, kMostNeighbours) : 3 * coefficients / 2);
 }
 
 std::vector<double> ProposalSelector::scaled(const ParameterSet& set) const {
@@ -77,58 +82,59 @@ std::vector<std::size_t> ProposalSelector::nearest(const std::vector<double>& po
   return places;
 }
 
-bool ProposalSelector::fitTo(std::span<const std::size_t> places) {
+bool ProposalSelector::fitTo(const std::vector<std::size_t>& places) {
+  if (!fitted_.empty() && places == fitted_) return true;
+  fitted_.clear();
   std::vector<std::vector<double>> points;
   std::vector<double> values;
   for (const std::size_t place : places) {
     points.push_back(points_[place]);
     values.push_back(values_[place]);
   }
-  return model_->fit(points, values);
+  if (!model_->fit(points, values)) return false;
+  fitted_ = places;
+  return true;
 }
 
 std::vector<double> ProposalSelector::predict(std::span<const ParameterSet> proposals) {
   std::vector<double> predictions;
-  std::vector<std::size_t> fitted;  // the points that the model is fitted to
   for (const ParameterSet& proposal : proposals) {
     const std::vector<double> point = scaled(proposal);
-    std::vector<std::size_t> neighbours = nearest(point);
-    if (neighbours != fitted) {
-      if (!fitTo(neighbours)) return {};
-      fitted = std::move(neighbours);
-    }
+    if (!fitTo(nearest(point))) return {};
     predictions.push_back(model_->predict(point));
   }
   return predictions;
 }
 
-/// `box` becomes that of the points to which the model is fitted.
-std::vector<double> ProposalSelector::minimumAround(const std::vector<double>& centre, Box& box) {
+std::optional<ProposalSelector::MinimumInBox> ProposalSelector::minimumAround(const std::vector<double>& centre) {
   const std::vector<std::size_t> neighbours = nearest(centre);
-  if (!fitTo(neighbours)) return {};
-  box = {centre, centre};
+  if (!fitTo(neighbours)) return std::nullopt;
+  Box box{centre, centre};
   for (const std::size_t place : neighbours) {
     for (std::size_t j = 0; j < centre.size(); ++j) {
       box.lower[j] = std::min(box.lower[j], points_[place][j]);
       box.upper[j] = std::max(box.upper[j], points_[place][j]);
     }
   }
-  return patternSearch([&](const std::vector<double>& point) { return model_->predict(point); }, centre, box);
+  const auto predicted = [&](const std::vector<double>& point) { return model_->predict(point); };
+  return MinimumInBox{patternSearch(predicted, centre, box), box};
 }
 
 std::vector<PredictedMinimum> ProposalSelector::minima(std::span<const ParameterSet> centres) {
   std::vector<PredictedMinimum> found;
   std::vector<std::vector<double>> foundPoints;
   for (std::size_t centre = 0; centre < centres.size(); ++centre) {
-    Box box;
-    std::vector<double> minimum = minimumAround(scaled(centres[centre]), box);
+    const std::optional<MinimumInBox> around = minimumAround(scaled(centres[centre]));
+    if (!around) continue;
+    const std::vector<double>& minimum = around->point;
+    const Box& box = around->box;
     const auto isSamePlace = [&](const std::vector<double>& point) {
       for (std::size_t j = 0; j < minimum.size(); ++j) {
         if (std::abs(minimum[j] - point[j]) > kSamePlace * (box.upper[j] - box.lower[j])) return false;
       }
       return true;
     };
-    if (minimum.empty() || std::any_of(points_.begin(), points_.end(), isSamePlace) ||
+    if (std::any_of(points_.begin(), points_.end(), isSamePlace) ||
         std::any_of(foundPoints.begin(), foundPoints.end(), isSamePlace)) {
       continue;
     }
@@ -138,7 +144,7 @@ std::vector<PredictedMinimum> ProposalSelector::minima(std::span<const Parameter
       set[j] = std::clamp(value, bounds_.lower[j], bounds_.upper[j]);
     }
     found.push_back({std::move(set), centre});
-    foundPoints.push_back(std::move(minimum));
+    foundPoints.push_back(minimum);
   }
   return found;
 }

@@ -2,6 +2,7 @@
 
 #include <cstddef>
 #include <memory>
+#include <optional>
 #include <span>
 #include <vector>
 
@@ -44,10 +45,14 @@ class ProposalSelector final {
 
  private:
   std::vector<double> scaled(const ParameterSet& set) const;
-  /// In coordinates relative to the bounds; empty where no model can be fitted.
-  std::vector<double> minimumAround(const std::vector<double>& centre, Box& box);
-  /// Fits the model to the points at `places`; false when it cannot be fitted.
-  bool fitTo(std::span<const std::size_t> places);
+  struct MinimumInBox {
+    std::vector<double> point;
+    Box box;  ///< of the points to which the model is fitted
+  };
+  /// Relative to the bounds, as `centre`; nothing where no model can be fitted.
+  std::optional<MinimumInBox> minimumAround(const std::vector<double>& centre);
+  /// Fits the model to the points at `places` unless it is; false when it cannot be fitted.
+  bool fitTo(const std::vector<std::size_t>& places);
   /// Predictions, one a proposal; empty when no model can be fitted.
   std::vector<double> predict(std::span<const ParameterSet> proposals);
   /// Places in the archive of the points nearest to `point`, in ascending order.
@@ -58,6 +63,7 @@ class ProposalSelector final {
   std::unique_ptr<SurrogateModel> model_;
   std::vector<std::vector<double>> points_;  ///< evaluated points relative to the bounds, in order of evaluation
   std::vector<double> values_;               ///< their objective values
+  std::vector<std::size_t> fitted_;          ///< places of the points that the model is fitted to
 };
 
 }  // namespace mirevo

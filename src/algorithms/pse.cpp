@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <cmath>
-#include <iterator>
 #include <utility>
 
 #include "algorithms/proposal_selector.h"
@@ -43,16 +42,15 @@ void Pse::makeLoop() {
   replaceParents(offspring, proposals);
 }
 
-/// With a surrogate model, runs where it predicts least around each of the best points take the place of the last
-/// offspring. They replace those points when better: the bad points stay where they are, and the population spread.
+/// With a surrogate model, runs where it predicts least around each of the best points take the turns of offspring
+/// spread evenly over the generation: were they those of the worst points, these would hardly ever move. They replace
+/// the points around which they were predicted when better, so that the population stays spread.
 void Pse::proposePredictedMinima(std::vector<Offspring>& offspring) {
   const std::size_t most = std::max(population_.size() / kPointsPerMinimum, std::size_t{1});
   std::vector<PredictedMinimum> minima = predictedMinima(std::span(population_).first(most));
-  offspring.resize(offspring.size() - minima.size());
-  std::vector<Offspring> refinements;
-  for (PredictedMinimum& minimum : minima) refinements.push_back({std::move(minimum.set), minimum.centre});
-  offspring.insert(offspring.begin(), std::make_move_iterator(refinements.begin()),
-                   std::make_move_iterator(refinements.end()));
+  for (std::size_t k = 0; k < minima.size(); ++k) {
+    offspring[k * offspring.size() / minima.size()] = {std::move(minima[k].set), minima[k].centre};
+  }
 }
 
 /// The parents of a generation, best first: what a budget cuts off are the offspring of the worst. The best points have

@@ -349,7 +349,7 @@ const std::vector<KeywordRow>& rows() {
        MIREVO_FIELD(c.optimisation.surrogate.samplingRate)},
       {kSurrogate, "Neighbourhood_Size", Type::integer, "0", from(0), "evaluated sets",
        "Nearest evaluated sets to which the surrogate is fitted; model type 0 needs (n+1)(n+2)/2 of them for n "
-       "variable parameters. 0: one and a half times as many.",
+       "variable parameters. 0: one and a half times as many for model type 0, thrice as many but at most 100 for 1.",
        MIREVO_FIELD(c.optimisation.surrogate.neighbourhoodSize)},
       {kSurrogate, "Model_Type", Type::integer, "0", between(0, 1), "",
        "0 full quadratic polynomial, 1 Gaussian process.", MIREVO_FIELD(c.optimisation.surrogate.modelType)},

@@ -241,10 +241,11 @@ void validateSurrogateControl(const OptimisationConfig& optimisation, std::size_
   const bool isNeighbourhoodGiven = surrogate.neighbourhoodSize > 0;
   if (isNeighbourhoodGiven && surrogate.modelType == 0 &&
       static_cast<std::size_t>(surrogate.neighbourhoodSize) < coefficientCount) {
-    section.refuse(kNeighbourhood, "Neighbourhood_Size",
-                   fmt::format("expected at least the {} coefficients of a quadratic polynomial in {} parameters, "
-                               "found {}",
-                               coefficientCount, variableCount, surrogate.neighbourhoodSize));
+    section.refuse(
+        kNeighbourhood, "Neighbourhood_Size",
+        fmt::format("expected at least the {} coefficients of a quadratic polynomial in {} parameters, or 0, "
+                    "found {}",
+                    coefficientCount, variableCount, surrogate.neighbourhoodSize));
   }
   section.check("Sampling_rate", surrogate.samplingRate,
                 "Error: Invalid sampling rate for surrogate modelling optimisation");
