@@ -18,13 +18,13 @@ namespace mirevo {
 ///   the reflection g − a·(u − g);
 ///   when it has failed the contraction g + c·(u − g);
 ///   when both have failed a mutation, taken even when worse: u has got stuck.
-/// The offspring is the move of the step that is due with `reflectionProbability`, a contraction at once with
-/// `contractionProbability`, else a mutation at once; it takes the place of u when better. A new point begins a step.
-/// A mutation is normally distributed about g, in every parameter on its own: that brings back the directions that the
-/// linear moves lose. It also stands in for a reflection outside the bounds. a and c are those of SCE.
-/// With a surrogate model the most promising of several offspring of a point is run; a quarter of the
-/// generation is run where the model predicts least around each of the best points. What the alternatives cost is
-/// measured in docs/algorithms/pse.md and docs/algorithms/surrogate.md.
+/// A mutation that is due is made; else the move that is due with `reflectionProbability`, a contraction at once with
+/// `contractionProbability`, and a mutation at once with what is left to 1. It takes the place of u when better. A new
+/// point begins a step. A mutation is normally distributed about g, in every parameter on its own: that brings back the
+/// directions that the linear moves lose. It also stands in for a reflection outside the bounds. a and c are those of
+/// SCE. With a surrogate model the most promising of several offspring of a point is run; a quarter of the generation
+/// is run where the model predicts least around each of the best points. What the alternatives cost is measured in
+/// docs/algorithms/pse.md and docs/algorithms/surrogate.md.
 class Pse final : public PopulationSearch {
  public:
   Pse(const PseSettings& settings, const SimplexSettings& simplex, SearchProblem problem);
