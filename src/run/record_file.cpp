@@ -115,7 +115,7 @@ std::string keepEarlierFile(const std::string& path) {
     failToKeep(path, std::strerror(errno));
   }
   if (!S_ISREG(status.st_mode) && !S_ISDIR(status.st_mode)) return {};
-  const std::string kept = firstFreeName(path, S_ISDIR(status.st_mode));
+  std::string kept = firstFreeName(path, S_ISDIR(status.st_mode));
   if (::rename(path.c_str(), kept.c_str()) != 0) {
     const char* reason = std::strerror(errno);
     failToKeep(path, fmt::format("It cannot be renamed to {}: {}", kept, reason));
