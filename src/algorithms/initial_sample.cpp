@@ -155,9 +155,10 @@ ParameterSet readRow(const std::vector<std::string_view>& cells, const std::vect
 SearchBounds searchBounds(const SearchSpace& space) {
   // Ten times the tolerance by which the integer rule lifts a value onto the next integer.
   constexpr double kBelowNextInteger = 1.0e-7;
-  SearchBounds bounds{space.lower, space.upper, space.initial};
+  SearchBounds bounds{space.lower, space.upper, space.initial, std::vector<bool>(space.size())};
   for (std::size_t j = 0; j < space.size(); ++j) {
-    if (space.transformation[j] == TransformationType::integer) bounds.upper[j] -= kBelowNextInteger;
+    bounds.isInteger[j] = space.transformation[j] == TransformationType::integer;
+    if (bounds.isInteger[j]) bounds.upper[j] -= kBelowNextInteger;
   }
   return bounds;
 }

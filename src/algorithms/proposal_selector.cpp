@@ -2,12 +2,14 @@
 
 #include <algorithm>
 #include <cmath>
+#include <limits>
 #include <numeric>
 #include <utility>
 
 #include "algorithms/gaussian_process.h"
 #include "algorithms/pattern_search.h"
 #include "algorithms/quadratic_surrogate.h"
+#include "parameters/search_space.h"
 
 namespace mirevo {
 namespace {
@@ -38,14 +40,35 @@ std::vector<double> ProposalSelector::scaled(const ParameterSet& set) const {
   std::vector<double> point(set.size());
   for (std::size_t j = 0; j < set.size(); ++j) {
     const double width = bounds_.upper[j] - bounds_.lower[j];
-    point[j] = width > 0.0 ? (set[j] - bounds_.lower[j]) / width : 0.0;
+    double value = set[j];
+    if (!bounds_.isInteger.empty() && bounds_.isInteger[j]) {
+      bool failed = false;
+      value = 0.5 + TransformParameterValue(value, bounds_.lower[j], TransformationType::integer,
+                                            TransformDirection::backward, failed);
+    }
+    point[j] = width > 0.0 ? (value - bounds_.lower[j]) / width : 0.0;
   }
   return point;
 }
 
+ParameterSet ProposalSelector::unscaled(const std::vector<double>& point) const {
+  ParameterSet set(point.size());
+  for (std::size_t j = 0; j < set.size(); ++j) {
+    const double value = bounds_.lower[j] + point[j] * (bounds_.upper[j] - bounds_.lower[j]);
+    set[j] = std::clamp(value, bounds_.lower[j], bounds_.upper[j]);
+  }
+  return set;
+}
+
+bool ProposalSelector::isKnown(const std::vector<double>& point) const {
+  return std::find(points_.begin(), points_.end(), point) != points_.end();
+}
+
 void ProposalSelector::note(const ParameterSet& set, const EvaluationResult& result) {
   if (!isUsable(result)) return;
-  points_.push_back(scaled(set));
+  std::vector<double> point = scaled(set);
+  if (isKnown(point)) return;
+  points_.push_back(std::move(point));
   values_.push_back(result.aggregate);
 }
 
@@ -100,6 +123,10 @@ std::vector<double> ProposalSelector::predict(std::span<const ParameterSet> prop
   std::vector<double> predictions;
   for (const ParameterSet& proposal : proposals) {
     const std::vector<double> point = scaled(proposal);
+    if (isKnown(point)) {
+      predictions.push_back(std::numeric_limits<double>::infinity());
+      continue;
+    }
     if (!fitTo(nearest(point))) return {};
     predictions.push_back(model_->predict(point));
   }
@@ -116,8 +143,11 @@ std::optional<ProposalSelector::MinimumInBox> ProposalSelector::minimumAround(co
       box.upper[j] = std::max(box.upper[j], points_[place][j]);
     }
   }
-  const auto predicted = [&](const std::vector<double>& point) { return model_->predict(point); };
-  return MinimumInBox{patternSearch(predicted, centre, box), box};
+  const bool hasIntegers =
+      std::find(bounds_.isInteger.begin(), bounds_.isInteger.end(), true) != bounds_.isInteger.end();
+  const auto asRun = [&](const std::vector<double>& point) { return hasIntegers ? scaled(unscaled(point)) : point; };
+  const auto predicted = [&](const std::vector<double>& point) { return model_->predict(asRun(point)); };
+  return MinimumInBox{asRun(patternSearch(predicted, centre, box)), box};
 }
 
 std::vector<PredictedMinimum> ProposalSelector::minima(std::span<const ParameterSet> centres) {
@@ -138,12 +168,7 @@ std::vector<PredictedMinimum> ProposalSelector::minima(std::span<const Parameter
         std::any_of(foundPoints.begin(), foundPoints.end(), isSamePlace)) {
       continue;
     }
-    ParameterSet set(minimum.size());
-    for (std::size_t j = 0; j < set.size(); ++j) {
-      const double value = bounds_.lower[j] + minimum[j] * (bounds_.upper[j] - bounds_.lower[j]);
-      set[j] = std::clamp(value, bounds_.lower[j], bounds_.upper[j]);
-    }
-    found.push_back({std::move(set), centre});
+    found.push_back({unscaled(minimum), centre});
     foundPoints.push_back(minimum);
   }
   return found;

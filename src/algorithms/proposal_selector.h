@@ -21,12 +21,14 @@ struct PredictedMinimum {
 
 /// Chooses with a surrogate model which proposals of a search are worth a model run. It keeps every evaluated point; a
 /// proposal is predicted by a model fitted to the `neighbourhoodSize` evaluated points nearest to it, distances taken
-/// relative to the bounds. Predictions rank proposals and do nothing else.
+/// relative to the bounds. An integer parameter lies in the middle of the step that the model takes it for, so that no
+/// proposal is told from one that makes the same run. Predictions rank proposals and do nothing else.
 class ProposalSelector final {
  public:
   ProposalSelector(const SurrogateSettings& settings, SearchBounds bounds);
 
-  /// Remembers an evaluated point. A failed one is left out: its stand-in value would distort every fit around it.
+  /// Remembers an evaluated point. A failed one is left out: its stand-in value would distort every fit around it. So
+  /// is one that has been evaluated before: repeated points would crowd others out of the neighbourhood.
   void note(const ParameterSet& set, const EvaluationResult& result);
 
   /// Whether proposals are ranked in this loop (counted from 0), rather than all run.
@@ -35,7 +37,7 @@ class ProposalSelector final {
   std::size_t proposalsPerRun() const;
 
   /// The `count` proposals with the best predictions, in ascending order of their places; where no model can be fitted,
-  /// the first `count`.
+  /// the first `count`. One that has been evaluated already comes after all others.
   std::vector<std::size_t> select(std::span<const ParameterSet> proposals, std::size_t count);
 
   /// For each of `centres` where the model fitted around it predicts least within the box of the points that it is
@@ -44,7 +46,11 @@ class ProposalSelector final {
   std::vector<PredictedMinimum> minima(std::span<const ParameterSet> centres);
 
  private:
+  /// Relative to the bounds, as the model takes it.
   std::vector<double> scaled(const ParameterSet& set) const;
+  ParameterSet unscaled(const std::vector<double>& point) const;
+  /// Whether that very point, relative to the bounds, has been evaluated.
+  bool isKnown(const std::vector<double>& point) const;
   struct MinimumInBox {
     std::vector<double> point;
     Box box;  ///< of the points to which the model is fitted

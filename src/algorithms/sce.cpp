@@ -6,6 +6,7 @@
 #include "algorithms/proposal_selector.h"
 
 namespace mirevo {
+
 Sce::Sce(const SceSettings& settings, const SimplexSettings& simplex, SearchProblem problem)
     : PopulationSearch(std::move(problem)), settings_(settings), simplex_(simplex) {}
 

@@ -14,6 +14,9 @@ struct SearchBounds {
   std::vector<double> lower;
   std::vector<double> upper;
   std::vector<double> initial;
+  /// Of a parameter that the model takes in whole steps from the lower bound: values in between are truncated. Empty
+  /// where there is none.
+  std::vector<bool> isInteger{};
 
   std::size_t size() const { return lower.size(); }
 };
