@@ -5,6 +5,7 @@
 #include <limits>
 
 #include "algorithms/lapack.h"
+#include "algorithms/quasi_newton.h"
 
 namespace mirevo {
 namespace {
@@ -14,39 +15,49 @@ const double kShortest = std::log(1.0e-4);
 const double kLongest = std::log(1.0e2);
 const double kLeastNoise = std::log(1.0e-8);
 const double kMostNoise = std::log(1.0e-1);
-constexpr double kFirstStep = 1.0;
-constexpr double kLastStep = 0.25;
+/// Of the search for the hyperparameters, in their logarithms and in −2·log likelihood.
+constexpr QuasiNewtonSettings kSearch{1.5, 0.1, 20};
 
 }  // namespace
 
-double GaussianProcess::kernel(std::span<const double> a, std::span<const double> b,
-                               std::span<const double> lengths) const {
-  double squares = 0.0;
-  for (std::size_t j = 0; j < a.size(); ++j) {
-    const double distance = (a[j] - b[j]) / lengths[j];
-    squares += distance * distance;
-  }
-  return std::exp(-0.5 * squares);
-}
-
-double GaussianProcess::solve(const Hyperparameters& parameters) {
+void GaussianProcess::notePairs() {
   const std::size_t m = points_.size();
-  const std::size_t n = parameters.size() - 1;
-  lengths_.resize(n);
-  for (std::size_t j = 0; j < n; ++j) lengths_[j] = std::exp(parameters[j]);
-  const double noise = std::exp(parameters[n]);
-  std::vector<double> matrix(m * m, 0.0);
-  for (std::size_t column = 0; column < m; ++column) {
-    matrix[column * m + column] = 1.0 + noise;
-    for (std::size_t row = column + 1; row < m; ++row) {
-      matrix[column * m + row] = kernel(points_[row], points_[column], lengths_);
+  squares_.clear();
+  for (std::size_t j = 0; j < points_.front().size(); ++j) {
+    for (std::size_t column = 0; column < m; ++column) {
+      for (std::size_t row = column + 1; row < m; ++row) {
+        const double difference = points_[row][j] - points_[column][j];
+        squares_.push_back(difference * difference);
+      }
     }
   }
+}
+
+double GaussianProcess::deviance(const std::vector<double>& parameters) {
+  const std::size_t m = points_.size();
+  const std::size_t n = parameters.size() - 1;
+  const std::size_t pairs = m * (m - 1) / 2;
+  kernels_.assign(pairs, 0.0);
+  lengths_.resize(n);
+  for (std::size_t j = 0; j < n; ++j) {
+    lengths_[j] = std::exp(parameters[j]);
+    const double factor = -0.5 / (lengths_[j] * lengths_[j]);
+    const double* squares = &squares_[j * pairs];
+    for (std::size_t pair = 0; pair < pairs; ++pair) kernels_[pair] += factor * squares[pair];
+  }
+  for (double& value : kernels_) value = std::exp(value);
+  noise_ = std::exp(parameters[n]);
+  matrix_.assign(m * m, 0.0);
+  std::size_t pair = 0;
+  for (std::size_t column = 0; column < m; ++column) {
+    matrix_[column * m + column] = 1.0 + noise_;
+    for (std::size_t row = column + 1; row < m; ++row) matrix_[column * m + row] = kernels_[pair++];
+  }
   const int order = static_cast<int>(m);
-  if (!choleskyFactor(matrix.data(), order)) return std::numeric_limits<double>::infinity();
+  if (!choleskyFactor(matrix_.data(), order)) return std::numeric_limits<double>::infinity();
 
   std::vector<double> ones(m, 1.0);  // becomes K⁻¹·1
-  choleskySolve(matrix.data(), order, ones.data());
+  choleskySolve(matrix_.data(), order, ones.data());
   double sumOfOnes = 0.0;
   double sumOfValues = 0.0;
   for (std::size_t i = 0; i < m; ++i) {
@@ -56,52 +67,60 @@ double GaussianProcess::solve(const Hyperparameters& parameters) {
   mean_ = sumOfValues / sumOfOnes;
   weights_.resize(m);
   for (std::size_t i = 0; i < m; ++i) weights_[i] = values_[i] - mean_;
-  choleskySolve(matrix.data(), order, weights_.data());
+  choleskySolve(matrix_.data(), order, weights_.data());
   double quadratic = 0.0;
   double logDeterminant = 0.0;
   for (std::size_t i = 0; i < m; ++i) {
     quadratic += (values_[i] - mean_) * weights_[i];
-    logDeterminant += 2.0 * std::log(matrix[i * m + i]);
+    logDeterminant += 2.0 * std::log(matrix_[i * m + i]);
   }
-  const double variance = quadratic / static_cast<double>(m);
-  if (!(variance > 0.0)) return std::numeric_limits<double>::infinity();
-  return static_cast<double>(m) * std::log(variance) + logDeterminant;
+  variance_ = quadratic / static_cast<double>(m);
+  if (!(variance_ > 0.0)) return std::numeric_limits<double>::infinity();
+  return static_cast<double>(m) * std::log(variance_) + logDeterminant;
 }
 
-/// The first fit tries some equal lengths, relative to the spread of each coordinate.
-void GaussianProcess::startSearch(std::size_t n, std::span<const double> spread) {
-  double best = std::numeric_limits<double>::infinity();
+/// Leaves the inverse in the factor's place and the derivative's factors in the kernels'; the next deviance() makes both
+/// again. With G = K⁻¹ − w·wᵀ/s² and w = K⁻¹(y − mean) the derivative is the sum of the products of the entries of G and of
+/// those of K's derivative (Rasmussen and Williams 2006, equation 5.9); mean and s² are at their own maximum.
+std::vector<double> GaussianProcess::devianceSlope() {
+  const std::size_t m = points_.size();
+  const std::size_t n = lengths_.size();
+  const std::size_t pairs = kernels_.size();
+  choleskyInverse(matrix_.data(), static_cast<int>(m));
+  std::vector<double> result(n + 1, 0.0);
+  std::size_t pair = 0;
+  for (std::size_t column = 0; column < m; ++column) {
+    result[n] += noise_ * (matrix_[column * m + column] - weights_[column] * weights_[column] / variance_);
+    for (std::size_t row = column + 1; row < m; ++row, ++pair) {
+      // Both triangles.
+      kernels_[pair] *= 2.0 * (matrix_[column * m + row] - weights_[column] * weights_[row] / variance_);
+    }
+  }
+  for (std::size_t j = 0; j < n; ++j) {
+    const double* squares = &squares_[j * pairs];
+    double sum = 0.0;
+    for (std::size_t k = 0; k < pairs; ++k) sum += kernels_[k] * squares[k];
+    result[j] = sum / (lengths_[j] * lengths_[j]);
+  }
+  return result;
+}
+
+/// Starts from where the last fit ended, or from equal lengths, relative to the spread of each coordinate, that are
+/// more likely: a search that has run off, to where the likelihood is flat, must not hold for all that follow.
+void GaussianProcess::startSearch(std::span<const double> spread) {
+  const std::size_t n = spread.size();
+  double best = parameters_.size() == n + 1 ? deviance(parameters_) : std::numeric_limits<double>::infinity();
+  if (parameters_.size() != n + 1) parameters_.clear();
   for (const double multiple : {0.3, 1.0, 3.0, 10.0}) {
-    Hyperparameters trial(n + 1, std::log(1.0e-4));
+    std::vector<double> trial(n + 1, std::log(1.0e-4));
     for (std::size_t j = 0; j < n; ++j) {
       trial[j] = std::clamp(std::log(multiple * std::max(spread[j], 1.0e-12)), kShortest, kLongest);
     }
-    const double likelihood = solve(trial);
-    if (parameters_.empty() || likelihood < best) {
-      best = likelihood;
+    const double reached = deviance(trial);
+    if (parameters_.empty() || reached < best) {
+      best = reached;
       parameters_ = trial;
     }
-  }
-}
-
-void GaussianProcess::search() {
-  const std::size_t n = parameters_.size() - 1;
-  double best = solve(parameters_);
-  double step = kFirstStep;
-  while (step >= kLastStep) {
-    for (std::size_t k = 0; k <= n; ++k) {
-      for (const double move : {step, -step}) {
-        Hyperparameters trial = parameters_;
-        trial[k] = k < n ? std::clamp(trial[k] + move, kShortest, kLongest)
-                         : std::clamp(trial[k] + 2.0 * move, kLeastNoise, kMostNoise);
-        const double likelihood = solve(trial);
-        if (!(likelihood < best)) continue;
-        best = likelihood;
-        parameters_ = trial;
-        break;
-      }
-    }
-    step /= 2.0;
   }
 }
 
@@ -120,17 +139,28 @@ bool GaussianProcess::fit(std::span<const std::vector<double>> points, std::span
     }
     spread[j] = most - least;
   }
-  if (parameters_.size() != n + 1) {
-    parameters_.clear();
-    startSearch(n, spread);
-  }
-  search();
-  return std::isfinite(solve(parameters_));
+  notePairs();
+  startSearch(spread);
+  Box bounds{std::vector<double>(n, kShortest), std::vector<double>(n, kLongest)};
+  bounds.lower.push_back(kLeastNoise);
+  bounds.upper.push_back(kMostNoise);
+  const SmoothFunction function{[this](const std::vector<double>& parameters) { return deviance(parameters); },
+                                [this] { return devianceSlope(); }};
+  const LowPoint found = quasiNewtonSearch(function, parameters_, bounds, kSearch);
+  parameters_ = found.point;
+  return std::isfinite(found.value);
 }
 
 double GaussianProcess::predict(std::span<const double> point) const {
   double sum = mean_;
-  for (std::size_t i = 0; i < points_.size(); ++i) sum += weights_[i] * kernel(point, points_[i], lengths_);
+  for (std::size_t i = 0; i < points_.size(); ++i) {
+    double squares = 0.0;
+    for (std::size_t j = 0; j < point.size(); ++j) {
+      const double distance = (point[j] - points_[i][j]) / lengths_[j];
+      squares += distance * distance;
+    }
+    sum += weights_[i] * std::exp(-0.5 * squares);
+  }
   return sum;
 }
 

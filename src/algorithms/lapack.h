@@ -35,4 +35,10 @@ inline void choleskySolve(const double* factor, int n, double* rightSide) {
   dpotrs_("L", &n, &one, factor, &n, rightSide, &n, &info);
 }
 
+/// Replaces the factor of choleskyFactor() by the inverse of the matrix, in the lower triangle.
+inline void choleskyInverse(double* factor, int n) {
+  int info = 0;
+  dpotri_("L", &n, factor, &n, &info);
+}
+
 }  // namespace mirevo

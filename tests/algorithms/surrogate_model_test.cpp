@@ -9,6 +9,7 @@
 #include "algorithms/latin_hypercube.h"
 #include "algorithms/proposal_selector.h"
 #include "algorithms/quadratic_surrogate.h"
+#include "algorithms/quasi_newton.h"
 
 namespace mirevo {
 namespace {
@@ -54,6 +55,42 @@ TEST(GaussianProcess, LearnsAWaveAndThatACoordinateHardlyMatters) {
   ASSERT_TRUE(model.fit(points, valuesOf(points, wave)));
   for (const auto& point : latinHypercube(10, 2, random)) EXPECT_NEAR(model.predict(point), wave(point), 0.02);
   EXPECT_GT(model.lengths()[1], 3.0 * model.lengths()[0]);
+}
+
+TEST(GaussianProcess, KnowsTheSlopeOfItsDeviance) {
+  UniformGenerator random(3);
+  const UnitPoints points = latinHypercube(25, 3, random);
+  GaussianProcess model;
+  ASSERT_TRUE(model.fit(points, valuesOf(points, quadratic)));
+  const std::vector<double> at{-1.0, 0.5, -0.3, -6.0};
+  ASSERT_TRUE(std::isfinite(model.deviance(at)));
+  const std::vector<double> slope = model.devianceSlope();
+  for (std::size_t k = 0; k < at.size(); ++k) {
+    std::vector<double> above = at;
+    std::vector<double> below = at;
+    above[k] += 1.0e-4;
+    below[k] -= 1.0e-4;
+    const double difference = (model.deviance(above) - model.deviance(below)) / 2.0e-4;
+    EXPECT_NEAR(slope[k], difference, 1.0e-4 * (1.0 + std::abs(difference))) << k;
+  }
+}
+
+TEST(QuasiNewtonSearch, GoesDownAValleyAndStopsAtABound) {
+  std::vector<double> last;
+  const SmoothFunction function{[&last](const std::vector<double>& x) {
+                                  last = x;
+                                  const double a = x[1] - x[0] * x[0];
+                                  return 100.0 * a * a + (1.0 - x[0]) * (1.0 - x[0]);
+                                },
+                                [&last] {
+                                  const double a = last[1] - last[0] * last[0];
+                                  return std::vector<double>{-400.0 * a * last[0] - 2.0 * (1.0 - last[0]), 200.0 * a};
+                                }};
+  const LowPoint free = quasiNewtonSearch(function, {-1.2, 1.0}, {{-5, -5}, {5, 5}}, {0.5, 1.0e-12, 100});
+  EXPECT_LT(free.value, 1.0e-6);
+  EXPECT_EQ(last, free.point);
+  const LowPoint bounded = quasiNewtonSearch(function, {-1.2, 1.0}, {{-5, -5}, {0.5, 5}}, {0.5, 1.0e-12, 100});
+  EXPECT_THAT(bounded.point, testing::ElementsAre(0.5, testing::DoubleNear(0.25, 1.0e-6)));
 }
 
 TEST(GaussianProcess, RefusesOrSurvivesDegeneratePoints) {

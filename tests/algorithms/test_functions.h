@@ -150,6 +150,7 @@ inline std::vector<TestFunction> testFunctions() {
       cube("Ackley 10-D", 10, -32.768, 32.768, 0, 0.0, ackley),
       cube("Rastrigin 10-D", 10, -5.12, 5.12, 0, 0.0, rastrigin),
       cube("Rosenbrock 10-D", 10, -5, 5, 1, 0.0, rosenbrock),
+      cube("Rosenbrock 4-D", 4, -5, 5, 1, 0.0, rosenbrock),
   };
 }
 
