@@ -4,8 +4,8 @@
 
 #include <algorithm>
 #include <functional>
-#include <memory>
 #include <iterator>
+#include <memory>
 #include <string>
 #include <string_view>
 #include <vector>

@@ -79,9 +79,9 @@ double GaussianProcess::deviance(const std::vector<double>& parameters) {
   return static_cast<double>(m) * std::log(variance_) + logDeterminant;
 }
 
-/// Leaves the inverse in the factor's place and the derivative's factors in the kernels'; the next deviance() makes both
-/// again. With G = K⁻¹ − w·wᵀ/s² and w = K⁻¹(y − mean) the derivative is the sum of the products of the entries of G and of
-/// those of K's derivative (Rasmussen and Williams 2006, equation 5.9); mean and s² are at their own maximum.
+/// Leaves the inverse in the factor's place and the derivative's factors in the kernels'; the next deviance() makes
+/// both again. With G = K⁻¹ − w·wᵀ/s² and w = K⁻¹(y − mean) the derivative is the sum of the products of the entries of
+/// G and of those of K's derivative (Rasmussen and Williams 2006, equation 5.9); mean and s² are at their own maximum.
 std::vector<double> GaussianProcess::devianceSlope() {
   const std::size_t m = points_.size();
   const std::size_t n = lengths_.size();

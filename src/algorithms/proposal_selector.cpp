@@ -28,13 +28,23 @@ std::unique_ptr<SurrogateModel> makeModel(int type) {
 
 }  // namespace
 
-ProposalSelector::ProposalSelector(const SurrogateSettings& settings, SearchBounds bounds)
-    : settings_(settings), bounds_(std::move(bounds)), model_(makeModel(settings.modelType)) {
-  if (settings_.neighbourhoodSize > 0) return;
-  const std::size_t coefficients = quadraticCoefficientCount(bounds_.size());
-  settings_.neighbourhoodSize = static_cast<std::int32_t>(
-      settings_.modelType == 1 ? std::min(3 * coefficients, kMostNeighbours) : 3 * coefficients / 2);
+std::string_view surrogateModelName(const SurrogateSettings& settings) {
+  return settings.modelType == 1 ? "Gaussian process" : "quadratic polynomial";
 }
+
+std::size_t neighbourhoodSize(const SurrogateSettings& settings, std::size_t n) {
+  if (settings.neighbourhoodSize > 0) return static_cast<std::size_t>(settings.neighbourhoodSize);
+  const std::size_t coefficients = quadraticCoefficientCount(n);
+  return settings.modelType == 1 ? std::min(3 * coefficients, kMostNeighbours) : 3 * coefficients / 2;
+}
+
+std::size_t leastSetCount(const SurrogateSettings& settings, std::size_t n) {
+  // Fewer than a plane needs say nothing about the shape of the objective.
+  return settings.modelType == 0 ? quadraticCoefficientCount(n) : n + 2;
+}
+
+ProposalSelector::ProposalSelector(const SurrogateSettings& settings, SearchBounds bounds)
+    : settings_(settings), bounds_(std::move(bounds)), model_(makeModel(settings.modelType)) {}
 
 std::vector<double> ProposalSelector::scaled(const ParameterSet& set) const {
   std::vector<double> point(set.size());
@@ -73,10 +83,7 @@ void ProposalSelector::note(const ParameterSet& set, const EvaluationResult& res
 }
 
 bool ProposalSelector::isActive(int loop) const {
-  const std::size_t n = bounds_.size();
-  // Fewer points than a plane needs say nothing about the shape of the objective.
-  const std::size_t least = settings_.modelType == 0 ? quadraticCoefficientCount(n) : n + 2;
-  return loop >= settings_.initialGenerations && points_.size() >= least;
+  return loop >= settings_.initialGenerations && points_.size() >= leastSetCount(settings_, bounds_.size());
 }
 
 std::size_t ProposalSelector::proposalsPerRun() const {
@@ -87,7 +94,7 @@ std::size_t ProposalSelector::proposalsPerRun() const {
 std::vector<std::size_t> ProposalSelector::nearest(const std::vector<double>& point) const {
   std::vector<std::size_t> places(points_.size());
   std::iota(places.begin(), places.end(), std::size_t{0});
-  const auto wanted = static_cast<std::size_t>(std::max(settings_.neighbourhoodSize, 2));
+  const std::size_t wanted = std::max(neighbourhoodSize(settings_, bounds_.size()), std::size_t{2});
   if (places.size() <= wanted) return places;
   std::vector<double> distances(points_.size());
   for (std::size_t i = 0; i < points_.size(); ++i) {

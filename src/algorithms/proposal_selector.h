@@ -4,6 +4,7 @@
 #include <memory>
 #include <optional>
 #include <span>
+#include <string_view>
 #include <vector>
 
 #include "algorithms/population.h"
@@ -19,8 +20,15 @@ struct PredictedMinimum {
   std::size_t centre = 0;  ///< place of that point among those asked about
 };
 
+/// "quadratic polynomial" or "Gaussian process".
+std::string_view surrogateModelName(const SurrogateSettings& settings);
+/// To how many evaluated sets of n parameters the model is fitted at most: as set or, where that is 0, chosen.
+std::size_t neighbourhoodSize(const SurrogateSettings& settings, std::size_t n);
+/// How many evaluated sets it takes before the model is used.
+std::size_t leastSetCount(const SurrogateSettings& settings, std::size_t n);
+
 /// Chooses with a surrogate model which proposals of a search are worth a model run. It keeps every evaluated point; a
-/// proposal is predicted by a model fitted to the `neighbourhoodSize` evaluated points nearest to it, distances taken
+/// proposal is predicted by a model fitted to the neighbourhoodSize() evaluated points nearest to it, distances taken
 /// relative to the bounds. An integer parameter lies in the middle of the step that the model takes it for, so that no
 /// proposal is told from one that makes the same run. Predictions rank proposals and do nothing else.
 class ProposalSelector final {

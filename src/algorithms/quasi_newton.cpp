@@ -125,7 +125,7 @@ class QuasiNewton final {
 }  // namespace
 
 LowPoint quasiNewtonSearch(const SmoothFunction& function, std::vector<double> start, const Box& bounds,
-                                      const QuasiNewtonSettings& settings) {
+                           const QuasiNewtonSettings& settings) {
   return QuasiNewton(function, std::move(start), bounds, settings).run();
 }
 

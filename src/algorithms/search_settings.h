@@ -43,7 +43,7 @@ struct DdsSettings {
 struct SurrogateSettings {
   std::int32_t samplingRate = 25;       ///< per cent of the proposals that the model evaluates
   std::int32_t neighbourhoodSize = 0;   ///< 0: chosen by model type and number of parameters
-  std::int32_t modelType = 0;           ///< 0 quadratic polynomial, 1 Gaussian process
+  std::int32_t modelType = 1;           ///< 0 quadratic polynomial, 1 Gaussian process
   std::int32_t initialGenerations = 1;  ///< loops evaluated by the model alone
 };
 

@@ -351,8 +351,9 @@ const std::vector<KeywordRow>& rows() {
        "Nearest evaluated sets to which the surrogate is fitted; model type 0 needs (n+1)(n+2)/2 of them for n "
        "variable parameters. 0: one and a half times as many for model type 0, thrice as many but at most 100 for 1.",
        MIREVO_FIELD(c.optimisation.surrogate.neighbourhoodSize)},
-      {kSurrogate, "Model_Type", Type::integer, "0", between(0, 1), "",
-       "0 full quadratic polynomial, 1 Gaussian process.", MIREVO_FIELD(c.optimisation.surrogate.modelType)},
+      {kSurrogate, "Model_Type", Type::integer, "1", between(0, 1), "",
+       "0 full quadratic polynomial, 1 Gaussian process: fewer model runs, milliseconds of computation for each.",
+       MIREVO_FIELD(c.optimisation.surrogate.modelType)},
       {kSurrogate, "No_Initial_Generations", Type::integer, "1", from(1), "loops",
        "First loops that the model alone evaluates; with the initial sample they must fill a `Neighbourhood_Size` that "
        "is given.",

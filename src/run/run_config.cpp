@@ -9,6 +9,16 @@
 
 namespace mirevo {
 
+std::int64_t OptimisationConfig::populationSize() const {
+  if (algorithmType == AlgorithmType::sce) return std::int64_t{sce.complexCount} * sce.pointsPerComplex;
+  return pse.populationSize;
+}
+
+std::int64_t OptimisationConfig::evaluationsOfLoop() const {
+  if (algorithmType == AlgorithmType::sce) return std::int64_t{sce.complexCount} * sce.evolutionSteps;
+  return pse.populationSize;
+}
+
 std::size_t RunConfig::variableParameterCount() const {
   return static_cast<std::size_t>(std::count_if(
       parameters.begin(), parameters.end(),

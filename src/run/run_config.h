@@ -51,6 +51,10 @@ struct OptimisationConfig {
   StoppingCriteria stopping;
   InitialSampleSettings initialSample;
   std::vector<EarlierSearch> earlierSearches;  ///< of DDS; not from the setup but from the run that is taken up
+
+  /// Points of the initial sample of SCE or PSE, and model evaluations of a loop after it (of SCE at the least).
+  std::int64_t populationSize() const;
+  std::int64_t evaluationsOfLoop() const;
 };
 
 /// A setting that bears on the results, as the setup has it.

@@ -7,6 +7,7 @@
 
 #include <fmt/format.h>
 
+#include "algorithms/proposal_selector.h"
 #include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/text.h"
@@ -329,6 +330,19 @@ void warnAboutFewPoints(const SetupSection& section, std::string_view keyword, s
                fmt::format("found {}, at least {} are advised for the number of variable parameters", found, advised));
 }
 
+/// A budget that is spent before the surrogate model has enough evaluated sets is spent without it.
+void warnAboutLateSurrogate(const SetupSection& stopping, const OptimisationConfig& search, std::size_t variableCount) {
+  const auto sets = static_cast<double>(leastSetCount(search.surrogate, variableCount));
+  const double before = static_cast<double>(search.populationSize()) +
+                        static_cast<double>(search.evaluationsOfLoop()) * search.surrogate.initialGenerations;
+  if (search.stopping.maxEvaluations > std::max(sets, before)) return;
+  stopping.warn("Max_No_Evaluations",
+                fmt::format("found {}, the surrogate model chooses nothing before {} model evaluations: the initial "
+                            "sample and No_Initial_Generations = {} make {}, and a {} needs {} sets",
+                            search.stopping.maxEvaluations, std::max(sets, before), search.surrogate.initialGenerations,
+                            before, surrogateModelName(search.surrogate), sets));
+}
+
 void SetupReader::readOptimisation() {
   OptimisationConfig& search = config_.optimisation;
   const SetupSection section = target_.open("OPTIMISATION_ALGORITHM");
@@ -375,9 +389,7 @@ void SetupReader::readOptimisation() {
   stopping.read(config_);
   if (isDds) validateDdsBudget(search.stopping, stopping);
   validateStoppingCriteria(search.stopping, stopping);
-  const std::int64_t sampleSize = search.algorithmType == AlgorithmType::sce
-                                      ? std::int64_t{search.sce.complexCount} * search.sce.pointsPerComplex
-                                      : search.pse.populationSize;
+  const std::int64_t sampleSize = search.populationSize();
   if (!isDds && sampleSize > search.stopping.maxEvaluations) {
     stopping.warn("Max_No_Evaluations", fmt::format("the initial sample of {} sets is cut to {}, and no search follows",
                                                     sampleSize, search.stopping.maxEvaluations));
@@ -387,7 +399,11 @@ void SetupReader::readOptimisation() {
   const SetupSection surrogate = section.open("SURROGATE_MODEL_PARAMETERS");
   surrogate.read(config_);
   validateSurrogateControl(search, config_.variableParameterCount(), surrogate);
-  if (isDds) section.warn("Use_Surrogate_Model", "Dynamically Dimensioned Search uses no surrogate model");
+  if (isDds) {
+    section.warn("Use_Surrogate_Model", "Dynamically Dimensioned Search uses no surrogate model");
+  } else {
+    warnAboutLateSurrogate(stopping, search, config_.variableParameterCount());
+  }
 }
 
 /// SCE and PSE measure their population by each parameter's range. An integer parameter always has one.

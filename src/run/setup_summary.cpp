@@ -5,6 +5,7 @@
 
 #include <fmt/format.h>
 
+#include "algorithms/proposal_selector.h"
 #include "common/text.h"
 #include "platform/kdx.h"
 
@@ -90,6 +91,17 @@ class Summary final {
                                 : aggregationMethodName(config_.aggregationMethod));
   }
 
+  void addSurrogate(std::size_t variableCount) {
+    const OptimisationConfig& search = config_.optimisation;
+    if (config_.simulationOption != SimulationOption::parameterOptimisation || search.useSurrogateModel != 1 ||
+        search.algorithmType == AlgorithmType::dds) {
+      return;
+    }
+    line("Surrogate model: {} fitted to the {} nearest sets, runs {} % of the proposals; loops without it: {}",
+         surrogateModelName(search.surrogate), neighbourhoodSize(search.surrogate, variableCount),
+         search.surrogate.samplingRate, search.surrogate.initialGenerations);
+  }
+
   template <class... Values>
   void line(fmt::format_string<Values...> format, Values&&... values) {
     if (!text_.empty()) text_ += '\n';
@@ -163,6 +175,7 @@ std::string setupSummary(const RunConfig& config, const SearchSpace& space, std:
   if (config.drawsRandomNumbers()) summary.line("Random seed: {}", config.randomSeed);
   summary.line("Model evaluations planned: {}{}", config.plannedEvaluations(),
                config.simulationOption == SimulationOption::parameterOptimisation ? " and a final model run" : "");
+  summary.addSurrogate(space.size());
   summary.line("Simultaneous simulations: {}{}", config.simultaneousSimulations,
                config.useSingleThread ? ", one thread each" : "");
   return summary.text();

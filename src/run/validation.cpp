@@ -253,12 +253,8 @@ void validateSurrogateControl(const OptimisationConfig& optimisation, std::size_
                 "Error: Invalid no of initial generations for surrogate modelling optimisation");
   if (optimisation.algorithmType == AlgorithmType::dds) return;
 
-  const SceSettings& sce = optimisation.sce;
-  const bool isSce = optimisation.algorithmType == AlgorithmType::sce;
-  const double population =
-      isSce ? static_cast<double>(sce.complexCount) * sce.pointsPerComplex : optimisation.pse.populationSize;
-  const double perLoop = isSce ? static_cast<double>(sce.complexCount) * sce.evolutionSteps : population;
-  const double available = population + perLoop * surrogate.initialGenerations;
+  const double perLoop = static_cast<double>(optimisation.evaluationsOfLoop());
+  const double available = static_cast<double>(optimisation.populationSize()) + perLoop * surrogate.initialGenerations;
   if (available < surrogate.neighbourhoodSize) {
     section.refuse(
         "Error: Population size and/or initial No. of generations too small for surrogate modelling optimisation",

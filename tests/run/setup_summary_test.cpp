@@ -41,6 +41,8 @@ TEST_F(SetupSummaryTest, SaysWhatTheRunIsAboutToDo) {
       "Aggregation: No transformation\n"
       "Random seed: -77\n"
       "Model evaluations planned: 500 and a final model run\n"
+      "Surrogate model: quadratic polynomial fitted to the 60 nearest sets, runs 30 % of the proposals; loops without "
+      "it: 2\n"
       "Simultaneous simulations: 4");
 }
 
