@@ -204,15 +204,19 @@ TEST_P(EitherSearch, IsHelpedByTheSurrogateModelWithinTheSameBudgetAndRules) {
   EXPECT_GE(successes[1], successes[-1] + 3);
 }
 
+/// A problem whose sample is (5, 5), (6, 5), (5, 7).
+SearchProblem fromThreePoints(Evaluator& evaluator, UniformGenerator& random) {
+  InitialSampleSettings fromFile;
+  fromFile.includeInitialParameters = false;
+  fromFile.generation = 4;
+  return {{{0, 0}, {20, 20}, {0, 0}}, onBudget(100), fromFile, {{5, 5}, {6, 5}, {5, 7}}, evaluator, random};
+}
+
 /// One evolution step of one complex: a plane, so that the reflection is always better than the worst point.
 TEST(Sce, ReflectsTheWorstPointOfTheSubcomplexFirst) {
   FunctionEvaluator evaluator([](const ParameterSet& x) { return resultOf(x[0] + x[1]); });
   UniformGenerator random(1);
-  const std::vector<ParameterSet> given{{5, 5}, {6, 5}, {5, 7}};
-  InitialSampleSettings fromFile;
-  fromFile.includeInitialParameters = false;
-  fromFile.generation = 4;
-  Sce sce({1, 3, 1}, {3}, {{{0, 0}, {20, 20}, {0, 0}}, onBudget(100), fromFile, given, evaluator, random});
+  Sce sce({1, 3, 1}, {3}, fromThreePoints(evaluator, random));
   ASSERT_EQ(sce.initialise(), kSearchOk);
   ASSERT_EQ(sce.advance(), kSearchOk);
   // g = (5.5, 5), u = (5, 7), a = 1 for two parameters: 2g − u = (6, 3).
@@ -226,11 +230,7 @@ TEST(Sce, ContractsWhereTheReflectionIsNoBetterAndElseTakesARandomPoint) {
   int count = 0;
   FunctionEvaluator counting([&count](const ParameterSet&) { return resultOf(++count); });
   UniformGenerator random(1);
-  const std::vector<ParameterSet> given{{5, 5}, {6, 5}, {5, 7}};
-  InitialSampleSettings fromFile;
-  fromFile.includeInitialParameters = false;
-  fromFile.generation = 4;
-  Sce sce({1, 3, 1}, {3}, {{{0, 0}, {20, 20}, {0, 0}}, onBudget(100), fromFile, given, counting, random});
+  Sce sce({1, 3, 1}, {3}, fromThreePoints(counting, random));
   ASSERT_EQ(sce.initialise(), kSearchOk);
   ASSERT_EQ(sce.advance(), kSearchOk);
   ASSERT_EQ(counting.batches.size(), 4U);
@@ -275,11 +275,7 @@ TEST(Pse, ReflectsThenContractsAndGivesAStuckPointUp) {
   int count = 0;
   FunctionEvaluator counting([&count](const ParameterSet&) { return resultOf(++count); });
   UniformGenerator random(1);
-  const std::vector<ParameterSet> given{{5, 5}, {6, 5}, {5, 7}};
-  InitialSampleSettings fromFile;
-  fromFile.includeInitialParameters = false;
-  fromFile.generation = 4;
-  Pse pse({3, 1.0, 0.0}, {3}, {{{0, 0}, {20, 20}, {0, 0}}, onBudget(100), fromFile, given, counting, random});
+  Pse pse({3, 1.0, 0.0}, {3}, fromThreePoints(counting, random));
   ASSERT_EQ(pse.initialise(), kSearchOk);
   for (int loop = 0; loop < 3; ++loop) ASSERT_EQ(pse.advance(), kSearchOk);
   // The best point stays; its turn goes to the worst one, whose offspring are the last two of a batch.

@@ -2,6 +2,7 @@
 #include <chrono>
 #include <cmath>
 #include <memory>
+#include <ostream>
 #include <random>
 
 #include <gmock/gmock.h>
@@ -110,6 +111,10 @@ struct KilledRun {
   Edits edits;
   int processes = 0;  ///< of an MPI job; 0: a plain run
 };
+
+void PrintTo(const KilledRun& run, std::ostream* stream) {
+  *stream << run.name;
+}
 
 class KilledRuns : public Restart, public ::testing::WithParamInterface<KilledRun> {};
 
