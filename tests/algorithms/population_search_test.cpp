@@ -204,6 +204,22 @@ TEST_P(EitherSearch, IsHelpedByTheSurrogateModelWithinTheSameBudgetAndRules) {
   EXPECT_GE(successes[1], successes[-1] + 3);
 }
 
+TEST_P(EitherSearch, PutsAPredictedMinimumInThePlaceOfThePointThatItRefines) {
+  const SearchBounds bounds{{-5, -5}, {5, 5}, {0, 0}};
+  const auto bowl = [](const ParameterSet& x) { return 1.0 + (x[0] - 1) * (x[0] - 1) + 2 * (x[1] + 2) * (x[1] + 2); };
+  FunctionEvaluator evaluator([&bowl](const ParameterSet& x) { return resultOf(bowl(x)); });
+  UniformGenerator random(2);
+  ProposalSelector selector({25, 0, 0, 1}, bounds);  // of the polynomial, whose minimum is the function's
+  const auto search = makeSearch(GetParam(), 2, {bounds, onBudget(200), {}, {}, evaluator, random, &selector});
+  ASSERT_EQ(search->initialise(), kSearchOk);
+  ASSERT_EQ(search->advance(), kSearchOk);
+  const Individual before = search->population().front();
+  ASSERT_GT(before.value(), 1.01);
+  ASSERT_EQ(search->advance(), kSearchOk);
+  EXPECT_LT(search->population().front().value(), 1.0001);
+  for (const Individual& point : search->population()) EXPECT_NE(point.set, before.set);
+}
+
 /// A problem whose sample is (5, 5), (6, 5), (5, 7).
 SearchProblem fromThreePoints(Evaluator& evaluator, UniformGenerator& random) {
   InitialSampleSettings fromFile;
@@ -280,9 +296,10 @@ TEST(Pse, ReflectsThenContractsAndGivesAStuckPointUp) {
   for (int loop = 0; loop < 3; ++loop) ASSERT_EQ(pse.advance(), kSearchOk);
   // The best point stays; its turn goes to the worst one, whose offspring are the last two of a batch.
   ASSERT_EQ(counting.batches.size(), 4U);
+  const ParameterSet reflected{5.5 + 1.1 * 0.5, 5 - 1.1 * 2};
   const ParameterSet contracted{5.5 - 0.4 * 0.5, 5 + 0.4 * 2};
   for (const std::size_t offspring : {1U, 2U}) {
-    EXPECT_THAT(counting.batches[1][offspring], ::testing::ElementsAre(6, 3));
+    EXPECT_THAT(counting.batches[1][offspring], ::testing::Pointwise(::testing::DoubleEq(), reflected));
     EXPECT_THAT(counting.batches[2][offspring], ::testing::Pointwise(::testing::DoubleEq(), contracted));
   }
   EXPECT_THAT(pse.population().back().set, ::testing::Not(::testing::ElementsAre(5, 7)));
