@@ -6,8 +6,13 @@
 //   faults --long                every call and error, hundreds of interruptions (many minutes)
 //   faults [--long] GROUP ...    only these: injected, interruptions, real
 
+#include <algorithm>
+#include <cstdio>
+#include <iterator>
 #include <string_view>
 #include <vector>
+
+#include <fmt/format.h>
 
 #include "faults/fault_report.h"
 #include "faults/injected_faults.h"
@@ -26,10 +31,14 @@ int main(int argc, char** argv) {
   bool isLong = false;
   std::vector<std::string_view> wanted;
   for (int i = 1; i < argc; ++i) {
-    if (std::string_view(argv[i]) == "--long") {
+    const std::string_view argument = argv[i];
+    if (argument == "--long") {
       isLong = true;
+    } else if (std::ranges::find(kGroups, argument, &Group::name) != std::end(kGroups)) {
+      wanted.push_back(argument);
     } else {
-      wanted.emplace_back(argv[i]);
+      fmt::print(stderr, "Usage: faults [--long] [injected] [interruptions] [real]\n");
+      return 2;
     }
   }
   FaultReport report;
