@@ -122,6 +122,11 @@ void GaussianProcess::startSearch(std::span<const double> spread) {
       parameters_ = trial;
     }
   }
+  // The likelihood is indifferent to the length of a coordinate that does not vary; elsewhere in it, nothing shall
+  // differ.
+  for (std::size_t j = 0; j < n; ++j) {
+    if (!(spread[j] > 0.0)) parameters_[j] = kLongest;
+  }
 }
 
 bool GaussianProcess::fit(std::span<const std::vector<double>> points, std::span<const double> values) {

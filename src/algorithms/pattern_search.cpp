@@ -14,10 +14,11 @@ constexpr int kMostRounds = 200;
 using Function = std::function<double(const std::vector<double>&)>;
 
 /// Moves `point`, of value `value`, along every coordinate in turn where that is better; returns the value reached.
-double explore(const Function& function, std::vector<double>& point, double value, double step, const Box& box) {
+double explore(const Function& function, std::vector<double>& point, double value, double step, const Box& box,
+               const std::vector<double>& leastMoves) {
   for (std::size_t j = 0; j < point.size(); ++j) {
     const double old = point[j];
-    const double move = step * (box.upper[j] - box.lower[j]);
+    const double move = std::max(step * (box.upper[j] - box.lower[j]), leastMoves[j]);
     for (const double target : {old + move, old - move}) {
       point[j] = std::clamp(target, box.lower[j], box.upper[j]);
       const double trial = point[j] == old ? value : function(point);
@@ -42,13 +43,14 @@ std::vector<double> beyond(const std::vector<double>& from, const std::vector<do
 
 }  // namespace
 
-std::vector<double> patternSearch(const Function& function, std::vector<double> start, const Box& box) {
+std::vector<double> patternSearch(const Function& function, std::vector<double> start, const Box& box,
+                                  const std::vector<double>& leastMoves) {
   std::vector<double> best = std::move(start);
   double value = function(best);
   double step = kFirstStep;
   for (int round = 0; round < kMostRounds && step >= kLastStep; ++round) {
     std::vector<double> next = best;
-    double found = explore(function, next, value, step, box);
+    double found = explore(function, next, value, step, box, leastMoves);
     if (!isBetter(found, value)) step /= 2.0;
     for (; isBetter(found, value) && round < kMostRounds; ++round) {
       std::vector<double> ahead = beyond(best, next, box);
@@ -56,7 +58,7 @@ std::vector<double> patternSearch(const Function& function, std::vector<double> 
       value = found;
       next = std::move(ahead);
       const double reached = function(next);
-      found = explore(function, next, reached, step, box);
+      found = explore(function, next, reached, step, box, leastMoves);
     }
   }
   return best;

@@ -43,6 +43,11 @@ std::size_t leastSetCount(const SurrogateSettings& settings, std::size_t n) {
   return settings.modelType == 0 ? quadraticCoefficientCount(n) : n + 2;
 }
 
+std::size_t proposalsPerRun(const SurrogateSettings& settings) {
+  const int rate = std::clamp(settings.samplingRate, 1, 100);
+  return static_cast<std::size_t>((100 + rate - 1) / rate);
+}
+
 ProposalSelector::ProposalSelector(const SurrogateSettings& settings, SearchBounds bounds)
     : settings_(settings), bounds_(std::move(bounds)), model_(makeModel(settings.modelType)) {}
 
@@ -71,24 +76,25 @@ ParameterSet ProposalSelector::unscaled(const std::vector<double>& point) const 
 }
 
 bool ProposalSelector::isKnown(const std::vector<double>& point) const {
-  return std::find(points_.begin(), points_.end(), point) != points_.end();
+  const auto isAmong = [&](const auto& points) {
+    return std::find(points.begin(), points.end(), point) != points.end();
+  };
+  return isAmong(points_) || isAmong(failed_);
 }
 
 void ProposalSelector::note(const ParameterSet& set, const EvaluationResult& result) {
-  if (!isUsable(result)) return;
   std::vector<double> point = scaled(set);
   if (isKnown(point)) return;
+  if (!isUsable(result)) {
+    failed_.push_back(std::move(point));
+    return;
+  }
   points_.push_back(std::move(point));
   values_.push_back(result.aggregate);
 }
 
 bool ProposalSelector::isActive(int loop) const {
   return loop >= settings_.initialGenerations && points_.size() >= leastSetCount(settings_, bounds_.size());
-}
-
-std::size_t ProposalSelector::proposalsPerRun() const {
-  const int rate = std::clamp(settings_.samplingRate, 1, 100);
-  return static_cast<std::size_t>((100 + rate - 1) / rate);
 }
 
 std::vector<std::size_t> ProposalSelector::nearest(const std::vector<double>& point) const {
@@ -150,11 +156,16 @@ std::optional<ProposalSelector::MinimumInBox> ProposalSelector::minimumAround(co
       box.upper[j] = std::max(box.upper[j], points_[place][j]);
     }
   }
+  // An integer parameter moves by whole steps, however narrow the box.
+  std::vector<double> leastMoves(centre.size(), 0.0);
+  for (std::size_t j = 0; j < bounds_.isInteger.size(); ++j) {
+    if (bounds_.isInteger[j]) leastMoves[j] = 1.0 / (bounds_.upper[j] - bounds_.lower[j]);
+  }
   const bool hasIntegers =
       std::find(bounds_.isInteger.begin(), bounds_.isInteger.end(), true) != bounds_.isInteger.end();
   const auto asRun = [&](const std::vector<double>& point) { return hasIntegers ? scaled(unscaled(point)) : point; };
   const auto predicted = [&](const std::vector<double>& point) { return model_->predict(asRun(point)); };
-  return MinimumInBox{asRun(patternSearch(predicted, centre, box)), box};
+  return MinimumInBox{asRun(patternSearch(predicted, centre, box, leastMoves)), box};
 }
 
 std::vector<PredictedMinimum> ProposalSelector::minima(std::span<const ParameterSet> centres) {
@@ -171,10 +182,8 @@ std::vector<PredictedMinimum> ProposalSelector::minima(std::span<const Parameter
       }
       return true;
     };
-    if (std::any_of(points_.begin(), points_.end(), isSamePlace) ||
-        std::any_of(foundPoints.begin(), foundPoints.end(), isSamePlace)) {
-      continue;
-    }
+    const auto isNear = [&](const auto& points) { return std::any_of(points.begin(), points.end(), isSamePlace); };
+    if (isNear(points_) || isNear(failed_) || isNear(foundPoints)) continue;
     found.push_back({unscaled(minimum), centre});
     foundPoints.push_back(minimum);
   }

@@ -26,6 +26,8 @@ std::string_view surrogateModelName(const SurrogateSettings& settings);
 std::size_t neighbourhoodSize(const SurrogateSettings& settings, std::size_t n);
 /// How many evaluated sets it takes before the model is used.
 std::size_t leastSetCount(const SurrogateSettings& settings, std::size_t n);
+/// How many proposals are made for each one to be run: 100 / samplingRate, rounded up.
+std::size_t proposalsPerRun(const SurrogateSettings& settings);
 
 /// Chooses with a surrogate model which proposals of a search are worth a model run. It keeps every evaluated point; a
 /// proposal is predicted by a model fitted to the neighbourhoodSize() evaluated points nearest to it, distances taken
@@ -35,14 +37,14 @@ class ProposalSelector final {
  public:
   ProposalSelector(const SurrogateSettings& settings, SearchBounds bounds);
 
-  /// Remembers an evaluated point. A failed one is left out: its stand-in value would distort every fit around it. So
-  /// is one that has been evaluated before: repeated points would crowd others out of the neighbourhood.
+  /// Remembers an evaluated point. No model is fitted to a failed one, whose stand-in value would distort every fit
+  /// around it, but it is not run again either. A repeated one is left out: it would crowd others out of the
+  /// neighbourhood.
   void note(const ParameterSet& set, const EvaluationResult& result);
 
   /// Whether proposals are ranked in this loop (counted from 0), rather than all run.
   bool isActive(int loop) const;
-  /// How many proposals to make for each one to be run: 100 / samplingRate, rounded up.
-  std::size_t proposalsPerRun() const;
+  std::size_t proposalsPerRun() const { return mirevo::proposalsPerRun(settings_); }
 
   /// The `count` proposals with the best predictions, in ascending order of their places; where no model can be fitted,
   /// the first `count`. One that has been evaluated already comes after all others.
@@ -77,6 +79,7 @@ class ProposalSelector final {
   std::unique_ptr<SurrogateModel> model_;
   std::vector<std::vector<double>> points_;  ///< evaluated points relative to the bounds, in order of evaluation
   std::vector<double> values_;               ///< their objective values
+  std::vector<std::vector<double>> failed_;  ///< points whose evaluation failed, in the same way
   std::vector<std::size_t> fitted_;          ///< places of the points that the model is fitted to
 };
 

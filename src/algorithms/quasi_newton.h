@@ -29,6 +29,6 @@ struct LowPoint {
 /// Numerical Optimization, chapter 6) reaches from `start` within the bounds, whose value() is the last one asked for.
 /// A coordinate on a bound that wants beyond it stays there for a move.
 LowPoint quasiNewtonSearch(const SmoothFunction& function, std::vector<double> start, const Box& bounds,
-                                      const QuasiNewtonSettings& settings);
+                           const QuasiNewtonSettings& settings);
 
 }  // namespace mirevo

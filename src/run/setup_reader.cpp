@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <array>
+#include <cmath>
 #include <filesystem>
 #include <unordered_map>
 
@@ -332,15 +333,20 @@ void warnAboutFewPoints(const SetupSection& section, std::string_view keyword, s
 
 /// A budget that is spent before the surrogate model has enough evaluated sets is spent without it.
 void warnAboutLateSurrogate(const SetupSection& stopping, const OptimisationConfig& search, std::size_t variableCount) {
+  const auto sample = static_cast<double>(search.populationSize());
+  const auto perLoop = static_cast<double>(search.evaluationsOfLoop());
   const auto sets = static_cast<double>(leastSetCount(search.surrogate, variableCount));
-  const double before = static_cast<double>(search.populationSize()) +
-                        static_cast<double>(search.evaluationsOfLoop()) * search.surrogate.initialGenerations;
-  if (search.stopping.maxEvaluations > std::max(sets, before)) return;
-  stopping.warn("Max_No_Evaluations",
-                fmt::format("found {}, the surrogate model chooses nothing before {} model evaluations: the initial "
-                            "sample and No_Initial_Generations = {} make {}, and a {} needs {} sets",
-                            search.stopping.maxEvaluations, std::max(sets, before), search.surrogate.initialGenerations,
-                            before, surrogateModelName(search.surrogate), sets));
+  // PSE asks once a generation, SCE at every step.
+  const double loops = search.algorithmType == AlgorithmType::pse ? std::ceil((sets - sample) / perLoop) : 0.0;
+  const double before =
+      std::max(sets, sample + perLoop * std::max(loops, static_cast<double>(search.surrogate.initialGenerations)));
+  const std::int32_t budget = search.stopping.maxEvaluations;
+  if (budget <= sample || budget > before) return;  // without any loop there is a warning already
+  stopping.warn(
+      "Max_No_Evaluations",
+      fmt::format("found {}, the surrogate model chooses nothing before {} model evaluations: it waits for "
+                  "No_Initial_Generations = {}, and a {} for {} sets",
+                  budget, before, search.surrogate.initialGenerations, surrogateModelName(search.surrogate), sets));
 }
 
 void SetupReader::readOptimisation() {

@@ -97,9 +97,9 @@ class Summary final {
         search.algorithmType == AlgorithmType::dds) {
       return;
     }
-    line("Surrogate model: {} fitted to the {} nearest sets, runs {} % of the proposals; loops without it: {}",
+    line("Surrogate model: {} fitted to the {} nearest sets, chooses one of {} proposals; loops without it: {}",
          surrogateModelName(search.surrogate), neighbourhoodSize(search.surrogate, variableCount),
-         search.surrogate.samplingRate, search.surrogate.initialGenerations);
+         proposalsPerRun(search.surrogate), search.surrogate.initialGenerations);
   }
 
   template <class... Values>

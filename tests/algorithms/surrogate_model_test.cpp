@@ -1,6 +1,7 @@
 #include "algorithms/surrogate_model.h"
 
 #include <cmath>
+#include <limits>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -57,6 +58,28 @@ TEST(GaussianProcess, LearnsAWaveAndThatACoordinateHardlyMatters) {
   EXPECT_GT(model.lengths()[1], 3.0 * model.lengths()[0]);
 }
 
+TEST(GaussianProcess, TakesACoordinateThatDoesNotVaryAsOneThatDoesNotMatter) {
+  GaussianProcess model;
+  UnitPoints points;
+  for (int i = 0; i < 12; ++i) points.push_back({0.5, i / 12.0});
+  const auto exponential = [](const std::vector<double>& x) { return std::exp(3.0 * x[1]); };
+  ASSERT_TRUE(model.fit(points, valuesOf(points, exponential)));
+  EXPECT_NEAR(model.predict(std::vector<double>{0.7, 0.3}), exponential({0.5, 0.3}), 0.1);
+}
+
+TEST(GaussianProcess, IsNotHeldWhereAnEarlierFitHasEnded) {
+  UniformGenerator random(4);
+  const UnitPoints points = latinHypercube(40, 2, random);
+  GaussianProcess model;
+  UnitPoints narrow = points;
+  for (auto& point : narrow) point = {0.5 + 1.0e-5 * point[0], 0.5 + 1.0e-5 * point[1]};
+  std::vector<double> noise;
+  for (std::size_t i = 0; i < narrow.size(); ++i) noise.push_back(random.next());
+  ASSERT_TRUE(model.fit(narrow, noise));
+  ASSERT_TRUE(model.fit(points, valuesOf(points, wave)));
+  for (const auto& point : latinHypercube(10, 2, random)) EXPECT_NEAR(model.predict(point), wave(point), 0.02);
+}
+
 TEST(GaussianProcess, KnowsTheSlopeOfItsDeviance) {
   UniformGenerator random(3);
   const UnitPoints points = latinHypercube(25, 3, random);
@@ -88,9 +111,23 @@ TEST(QuasiNewtonSearch, GoesDownAValleyAndStopsAtABound) {
                                 }};
   const LowPoint free = quasiNewtonSearch(function, {-1.2, 1.0}, {{-5, -5}, {5, 5}}, {0.5, 1.0e-12, 100});
   EXPECT_LT(free.value, 1.0e-6);
-  EXPECT_EQ(last, free.point);
   const LowPoint bounded = quasiNewtonSearch(function, {-1.2, 1.0}, {{-5, -5}, {0.5, 5}}, {0.5, 1.0e-12, 100});
   EXPECT_THAT(bounded.point, testing::ElementsAre(0.5, testing::DoubleNear(0.25, 1.0e-6)));
+  // From the bound itself, where each coordinate's slope depends on the other's value.
+  const LowPoint held = quasiNewtonSearch(function, {0.5, 4.0}, {{-5, -5}, {0.5, 5}}, {0.5, 1.0e-12, 100});
+  EXPECT_THAT(held.point, testing::ElementsAre(0.5, testing::DoubleNear(0.25, 1.0e-6)));
+}
+
+TEST(QuasiNewtonSearch, ComesBackFromWhereItsLastMovesFailed) {
+  std::vector<double> last;
+  const SmoothFunction wall{[&last](const std::vector<double>& x) {
+                              last = x;
+                              return x[0] < 0.3 ? std::numeric_limits<double>::infinity() : x[0];
+                            },
+                            [] { return std::vector<double>{1.0}; }};
+  const LowPoint found = quasiNewtonSearch(wall, {1.0}, {{-5}, {5}}, {0.5, 0.0, 100});
+  EXPECT_NEAR(found.value, 0.3, 0.01);
+  EXPECT_EQ(last, found.point);
 }
 
 TEST(GaussianProcess, RefusesOrSurvivesDegeneratePoints) {
@@ -116,7 +153,7 @@ TEST(ProposalSelector, RanksByPredictionAndLeavesFailuresOut) {
     }
     EXPECT_FALSE(selector.isActive(1));
     EXPECT_TRUE(selector.isActive(2));
-    const std::vector<ParameterSet> proposals{{-4.5}, {2}, {0.5}, {3.5}, {7}};
+    const std::vector<ParameterSet> proposals{{-4.5}, {2.2}, {0.5}, {3.5}, {7}};
     EXPECT_THAT(selector.select(proposals, 2), testing::ElementsAre(1, 3)) << type;
     EXPECT_THAT(selector.select(proposals, 9), testing::ElementsAre(0, 1, 2, 3, 4)) << type;
   }
@@ -152,6 +189,48 @@ TEST(ProposalSelector, FindsTheModelsMinimumInItsNeighbourhoodOnce) {
       EXPECT_TRUE(selector.minima(std::vector<ParameterSet>{found}).empty());
     }
   }
+}
+
+TEST(ProposalSelector, MovesAnIntegerParameterOfFewValuesEitherWay) {
+  for (const int type : {0, 1}) {
+    for (const int values : {2, 3}) {
+      for (const int wanted : {0, values - 1}) {
+        SCOPED_TRACE(testing::Message() << "type " << type << ", " << values << " values, wanted " << wanted);
+        const SearchBounds bounds{{0, 0}, {static_cast<double>(values), 1}, {0, 0}, {true, false}};
+        ProposalSelector selector({25, 18, type, 1}, bounds);
+        UniformGenerator random(1);
+        for (const auto& point : latinHypercube(18, 2, random)) {
+          const ParameterSet set{values * point[0], point[1]};
+          EvaluationResult result;
+          result.aggregate = 10.0 * std::abs(std::floor(set[0]) - wanted) + (set[1] - 0.3) * (set[1] - 0.3);
+          selector.note(set, result);
+        }
+        const std::vector<PredictedMinimum> minima =
+            selector.minima(std::vector<ParameterSet>{{values - 1.0 - wanted + 0.2, 0.8}});
+        ASSERT_EQ(minima.size(), 1u);
+        EXPECT_EQ(std::floor(minima.front().set[0]), wanted);
+      }
+    }
+  }
+}
+
+TEST(ProposalSelector, DoesNotRunAFailedPointAgain) {
+  const SearchBounds bounds{{1, 1}, {13, 13}, {1, 1}, {true, true}};
+  ProposalSelector selector({25, 0, 0, 1}, bounds);
+  const auto resultAt = [](double x, double y) {
+    EvaluationResult result;
+    result.aggregate = (x - 7) * (x - 7) + (y - 5) * (y - 5);
+    if (x == 7 && y == 5) result.failure.emplace();
+    return result;
+  };
+  for (double x = 2; x <= 12; x += 2) {
+    for (double y = 2; y <= 12; y += 2) selector.note({x, y}, resultAt(x, y));
+  }
+  const std::vector<ParameterSet> centre{{6, 6}};
+  ASSERT_EQ(selector.minima(centre).size(), 1u);
+  selector.note({7.5, 5.5}, resultAt(7, 5));
+  EXPECT_TRUE(selector.minima(centre).empty());
+  EXPECT_THAT(selector.select(std::vector<ParameterSet>{{7.2, 5.9}, {11, 1}}, 1), testing::ElementsAre(1));
 }
 
 TEST(ProposalSelector, TakesIntegerParametersAsTheModelDoes) {

@@ -198,8 +198,12 @@ TEST_F(SetupReaderTest, WarnsOfSearchSettingsThatEndASearchEarly) {
        "Max_No_Evaluations: the initial sample of 20 sets is cut to 19, and no search follows"},
       {"Max_No_Evaluations = 500 => 61", ""},
       {"Max_No_Evaluations = 500 => 60",
-       "Max_No_Evaluations: found 60, the surrogate model chooses nothing before 60 model evaluations: the initial "
-       "sample and No_Initial_Generations = 2 make 60, and a quadratic polynomial needs 6 sets"},
+       "Max_No_Evaluations: found 60, the surrogate model chooses nothing before 60 model evaluations: it waits for "
+       "No_Initial_Generations = 2, and a quadratic polynomial for 6 sets"},
+      {"Population_Size = 20 => 2 & No_Points_Simplex = 5 => 2 & Neighbourhood_Size = 60 => 0 & "
+       "No_Initial_Generations = 2 => 1 & Max_No_Evaluations = 500 => 6",
+       "found 6, the surrogate model chooses nothing before 6 model evaluations: it waits for "
+       "No_Initial_Generations = 1, and a quadratic polynomial for 6 sets"},
       {"Algorithm_Type = 1 => 0 & Max_No_Evaluations = 500 => 27",
        "Max_No_Evaluations: the initial sample of 28 sets is cut to 27"},
       {"Algorithm_Type = 1 => 2 & Max_No_Evaluations = 500 => 10", ""},

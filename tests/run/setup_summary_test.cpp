@@ -41,7 +41,7 @@ TEST_F(SetupSummaryTest, SaysWhatTheRunIsAboutToDo) {
       "Aggregation: No transformation\n"
       "Random seed: -77\n"
       "Model evaluations planned: 500 and a final model run\n"
-      "Surrogate model: quadratic polynomial fitted to the 60 nearest sets, runs 30 % of the proposals; loops without "
+      "Surrogate model: quadratic polynomial fitted to the 60 nearest sets, chooses one of 4 proposals; loops without "
       "it: 2\n"
       "Simultaneous simulations: 4");
 }
