@@ -21,6 +21,16 @@ constexpr double kSamePlace = 1.0e-3;
 /// Of a Gaussian process: the time for a fit grows with the third power of the neighbourhood.
 constexpr std::size_t kMostNeighbours = 100;
 
+/// Stands for a prediction where a run is likely to fail: better only than that of a run made again.
+constexpr double kLikelyToFail = std::numeric_limits<double>::max();
+constexpr double kMadeAgain = std::numeric_limits<double>::infinity();
+
+double squaredDistance(const std::vector<double>& a, const std::vector<double>& b) {
+  double sum = 0.0;
+  for (std::size_t j = 0; j < a.size(); ++j) sum += (a[j] - b[j]) * (a[j] - b[j]);
+  return sum;
+}
+
 std::unique_ptr<SurrogateModel> makeModel(int type) {
   if (type == 1) return std::make_unique<GaussianProcess>();
   return std::make_unique<QuadraticSurrogate>();
@@ -82,6 +92,15 @@ bool ProposalSelector::isKnown(const std::vector<double>& point) const {
   return isAmong(points_) || isAmong(failed_);
 }
 
+bool ProposalSelector::isLikelyToFail(const std::vector<double>& point) const {
+  const auto leastDistance = [&point](const auto& others) {
+    double least = std::numeric_limits<double>::infinity();
+    for (const auto& other : others) least = std::min(least, squaredDistance(other, point));
+    return least;
+  };
+  return !failed_.empty() && leastDistance(failed_) < leastDistance(points_);
+}
+
 void ProposalSelector::note(const ParameterSet& set, const EvaluationResult& result) {
   std::vector<double> point = scaled(set);
   if (isKnown(point)) return;
@@ -102,13 +121,9 @@ std::vector<std::size_t> ProposalSelector::nearest(const std::vector<double>& po
   std::iota(places.begin(), places.end(), std::size_t{0});
   const std::size_t wanted = std::max(neighbourhoodSize(settings_, bounds_.size()), std::size_t{2});
   if (places.size() <= wanted) return places;
-  std::vector<double> distances(points_.size());
-  for (std::size_t i = 0; i < points_.size(); ++i) {
-    for (std::size_t j = 0; j < point.size(); ++j) {
-      const double difference = points_[i][j] - point[j];
-      distances[i] += difference * difference;
-    }
-  }
+  std::vector<double> distances;
+  distances.reserve(points_.size());
+  for (const auto& other : points_) distances.push_back(squaredDistance(other, point));
   const auto byDistance = [&](std::size_t a, std::size_t b) {
     return distances[a] != distances[b] ? distances[a] < distances[b] : a < b;
   };
@@ -136,8 +151,8 @@ std::vector<double> ProposalSelector::predict(std::span<const ParameterSet> prop
   std::vector<double> predictions;
   for (const ParameterSet& proposal : proposals) {
     const std::vector<double> point = scaled(proposal);
-    if (isKnown(point)) {
-      predictions.push_back(std::numeric_limits<double>::infinity());
+    if (isKnown(point) || isLikelyToFail(point)) {
+      predictions.push_back(isKnown(point) ? kMadeAgain : kLikelyToFail);
       continue;
     }
     if (!fitTo(nearest(point))) return {};
@@ -164,7 +179,10 @@ std::optional<ProposalSelector::MinimumInBox> ProposalSelector::minimumAround(co
   const bool hasIntegers =
       std::find(bounds_.isInteger.begin(), bounds_.isInteger.end(), true) != bounds_.isInteger.end();
   const auto asRun = [&](const std::vector<double>& point) { return hasIntegers ? scaled(unscaled(point)) : point; };
-  const auto predicted = [&](const std::vector<double>& point) { return model_->predict(asRun(point)); };
+  const auto predicted = [&](const std::vector<double>& trial) {
+    const std::vector<double> point = asRun(trial);
+    return isLikelyToFail(point) ? kLikelyToFail : model_->predict(point);
+  };
   return MinimumInBox{asRun(patternSearch(predicted, centre, box, leastMoves)), box};
 }
 

@@ -47,7 +47,8 @@ class ProposalSelector final {
   std::size_t proposalsPerRun() const { return mirevo::proposalsPerRun(settings_); }
 
   /// The `count` proposals with the best predictions, in ascending order of their places; where no model can be fitted,
-  /// the first `count`. One that has been evaluated already comes after all others.
+  /// the first `count`. One of which the nearest evaluated point has failed comes after all others, and last of all
+  /// one that has been evaluated itself.
   std::vector<std::size_t> select(std::span<const ParameterSet> proposals, std::size_t count);
 
   /// For each of `centres` where the model fitted around it predicts least within the box of the points that it is
@@ -61,6 +62,8 @@ class ProposalSelector final {
   ParameterSet unscaled(const std::vector<double>& point) const;
   /// Whether that very point, relative to the bounds, has been evaluated.
   bool isKnown(const std::vector<double>& point) const;
+  /// Whether the nearest evaluated point has failed.
+  bool isLikelyToFail(const std::vector<double>& point) const;
   struct MinimumInBox {
     std::vector<double> point;
     Box box;  ///< of the points to which the model is fitted
