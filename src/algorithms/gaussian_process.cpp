@@ -109,8 +109,8 @@ std::vector<double> GaussianProcess::devianceSlope() {
 /// more likely: a search that has run off, to where the likelihood is flat, must not hold for all that follow.
 void GaussianProcess::startSearch(std::span<const double> spread) {
   const std::size_t n = spread.size();
-  double best = parameters_.size() == n + 1 ? deviance(parameters_) : std::numeric_limits<double>::infinity();
   if (parameters_.size() != n + 1) parameters_.clear();
+  double best = parameters_.empty() ? std::numeric_limits<double>::infinity() : deviance(parameters_);
   for (const double multiple : {0.3, 1.0, 3.0, 10.0}) {
     std::vector<double> trial(n + 1, std::log(1.0e-4));
     for (std::size_t j = 0; j < n; ++j) {
@@ -122,8 +122,8 @@ void GaussianProcess::startSearch(std::span<const double> spread) {
       parameters_ = trial;
     }
   }
-  // The likelihood is indifferent to the length of a coordinate that does not vary; elsewhere in it, nothing shall
-  // differ.
+  // The likelihood says nothing about the length of a coordinate that does not vary: predictions shall not depend on
+  // it.
   for (std::size_t j = 0; j < n; ++j) {
     if (!(spread[j] > 0.0)) parameters_[j] = kLongest;
   }

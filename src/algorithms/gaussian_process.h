@@ -7,7 +7,8 @@ namespace mirevo {
 /// A Gaussian process with constant mean and the anisotropic squared exponential kernel
 /// k(x, x') = s²·(exp(−½ Σ_j ((x_j − x'_j)/l_j)²) + ν·[x = x']), after Rasmussen and Williams (2006), Gaussian
 /// Processes for Machine Learning. Mean and s² are profiled out of the likelihood; the lengths l_j and the noise ratio
-/// ν maximise what is left by a quasi-Newton search in their logarithms, which starts where the previous fit ended.
+/// ν maximise what is left by a quasi-Newton search in their logarithms, which starts where the previous fit ended or,
+/// where one of a few equal lengths is likelier, there.
 class GaussianProcess final : public SurrogateModel {
  public:
   bool fit(std::span<const std::vector<double>> points, std::span<const double> values) override;
@@ -16,7 +17,8 @@ class GaussianProcess final : public SurrogateModel {
   const std::vector<double>& lengths() const { return lengths_; }
 
   /// −2·log likelihood, up to a constant, with the logarithms of the n lengths and of ν; infinity when the kernel
-  /// matrix is not positive definite. Only after fit(); predictions are then those of these hyperparameters.
+  /// matrix is not positive definite or the values do not vary. Only after fit(); predictions are then those of these
+  /// hyperparameters.
   double deviance(const std::vector<double>& parameters);
   /// Its derivatives at its last argument, where it was finite.
   std::vector<double> devianceSlope();

@@ -151,12 +151,15 @@ std::vector<double> ProposalSelector::predict(std::span<const ParameterSet> prop
   std::vector<double> predictions;
   for (const ParameterSet& proposal : proposals) {
     const std::vector<double> point = scaled(proposal);
-    if (isKnown(point) || isLikelyToFail(point)) {
-      predictions.push_back(isKnown(point) ? kMadeAgain : kLikelyToFail);
-      continue;
+    if (isKnown(point)) {
+      predictions.push_back(kMadeAgain);
+    } else if (isLikelyToFail(point)) {
+      predictions.push_back(kLikelyToFail);
+    } else if (fitTo(nearest(point))) {
+      predictions.push_back(model_->predict(point));
+    } else {
+      return {};
     }
-    if (!fitTo(nearest(point))) return {};
-    predictions.push_back(model_->predict(point));
   }
   return predictions;
 }

@@ -14,9 +14,11 @@ std::int64_t OptimisationConfig::populationSize() const {
   return pse.populationSize;
 }
 
-std::int64_t OptimisationConfig::evaluationsOfLoop() const {
-  if (algorithmType == AlgorithmType::sce) return std::int64_t{sce.complexCount} * sce.evolutionSteps;
-  return pse.populationSize;
+double OptimisationConfig::evaluationsAfter(double loops) const {
+  const double perLoop = algorithmType == AlgorithmType::sce
+                             ? static_cast<double>(sce.complexCount) * sce.evolutionSteps
+                             : static_cast<double>(pse.populationSize);
+  return static_cast<double>(populationSize()) + perLoop * loops;
 }
 
 std::size_t RunConfig::variableParameterCount() const {

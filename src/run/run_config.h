@@ -52,9 +52,10 @@ struct OptimisationConfig {
   InitialSampleSettings initialSample;
   std::vector<EarlierSearch> earlierSearches;  ///< of DDS; not from the setup but from the run that is taken up
 
-  /// Points of the initial sample of SCE or PSE, and model evaluations of a loop after it (of SCE at the least).
+  /// Points of the initial sample of SCE or PSE.
   std::int64_t populationSize() const;
-  std::int64_t evaluationsOfLoop() const;
+  /// Model evaluations that the sample and so many loops after it make, of SCE at the least.
+  double evaluationsAfter(double loops) const;
 };
 
 /// A setting that bears on the results, as the setup has it.

@@ -334,14 +334,13 @@ void warnAboutFewPoints(const SetupSection& section, std::string_view keyword, s
 /// A budget that is spent before the surrogate model has enough evaluated sets is spent without it.
 void warnAboutLateSurrogate(const SetupSection& stopping, const OptimisationConfig& search, std::size_t variableCount) {
   const auto sample = static_cast<double>(search.populationSize());
-  const auto perLoop = static_cast<double>(search.evaluationsOfLoop());
   const auto sets = static_cast<double>(leastSetCount(search.surrogate, variableCount));
   // PSE asks once a generation, SCE at every step.
-  const double loops = search.algorithmType == AlgorithmType::pse ? std::ceil((sets - sample) / perLoop) : 0.0;
-  const double before =
-      std::max(sets, sample + perLoop * std::max(loops, static_cast<double>(search.surrogate.initialGenerations)));
+  const double loops = search.algorithmType == AlgorithmType::pse ? std::ceil(sets / sample) - 1.0 : 0.0;
+  const double initialLoops = search.surrogate.initialGenerations;
+  const double before = std::max(sets, search.evaluationsAfter(std::max(loops, initialLoops)));
   const std::int32_t budget = search.stopping.maxEvaluations;
-  if (budget <= sample || budget > before) return;  // without any loop there is a warning already
+  if (budget <= sample || budget > before) return;  // where there is no loop, the surrogate makes no difference
   stopping.warn(
       "Max_No_Evaluations",
       fmt::format("found {}, the surrogate model chooses nothing before {} model evaluations: it waits for "

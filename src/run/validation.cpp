@@ -253,8 +253,7 @@ void validateSurrogateControl(const OptimisationConfig& optimisation, std::size_
                 "Error: Invalid no of initial generations for surrogate modelling optimisation");
   if (optimisation.algorithmType == AlgorithmType::dds) return;
 
-  const double perLoop = static_cast<double>(optimisation.evaluationsOfLoop());
-  const double available = static_cast<double>(optimisation.populationSize()) + perLoop * surrogate.initialGenerations;
+  const double available = optimisation.evaluationsAfter(surrogate.initialGenerations);
   if (available < surrogate.neighbourhoodSize) {
     section.refuse(
         "Error: Population size and/or initial No. of generations too small for surrogate modelling optimisation",

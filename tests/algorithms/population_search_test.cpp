@@ -23,10 +23,12 @@ using testing::resultOf;
 
 enum class Kind { sce, pse };
 
-std::unique_ptr<PopulationSearch> makeSearch(Kind kind, int complexes, const SearchProblem& problem) {
+/// With the settings that are usual, or another number of evolution steps in a loop of SCE.
+std::unique_ptr<PopulationSearch> makeSearch(Kind kind, int complexes, const SearchProblem& problem, int steps = 0) {
   const int n = static_cast<int>(problem.bounds.size());
   const SimplexSettings simplex{n + 1};
-  if (kind == Kind::sce) return std::make_unique<Sce>(SceSettings{complexes, 2 * n + 1, 2 * n + 1}, simplex, problem);
+  if (steps == 0) steps = 2 * n + 1;
+  if (kind == Kind::sce) return std::make_unique<Sce>(SceSettings{complexes, 2 * n + 1, steps}, simplex, problem);
   return std::make_unique<Pse>(PseSettings{complexes * (2 * n + 1)}, simplex, problem);
 }
 
@@ -210,7 +212,7 @@ TEST_P(EitherSearch, PutsAPredictedMinimumInThePlaceOfThePointThatItRefines) {
   FunctionEvaluator evaluator([&bowl](const ParameterSet& x) { return resultOf(bowl(x)); });
   UniformGenerator random(2);
   ProposalSelector selector({25, 0, 0, 1}, bounds);  // of the polynomial, whose minimum is the function's
-  const auto search = makeSearch(GetParam(), 2, {bounds, onBudget(200), {}, {}, evaluator, random, &selector});
+  const auto search = makeSearch(GetParam(), 2, {bounds, onBudget(200), {}, {}, evaluator, random, &selector}, 1);
   ASSERT_EQ(search->initialise(), kSearchOk);
   ASSERT_EQ(search->advance(), kSearchOk);
   const Individual before = search->population().front();

@@ -196,6 +196,7 @@ TEST_F(SetupReaderTest, WarnsOfSearchSettingsThatEndASearchEarly) {
        "No_Points_Subcomplex: found 2, at least 3 are advised"},
       {"Max_No_Evaluations = 500 => 19",
        "Max_No_Evaluations: the initial sample of 20 sets is cut to 19, and no search follows"},
+      {"Max_No_Evaluations = 500 => 20", ""},
       {"Max_No_Evaluations = 500 => 61", ""},
       {"Max_No_Evaluations = 500 => 60",
        "Max_No_Evaluations: found 60, the surrogate model chooses nothing before 60 model evaluations: it waits for "
