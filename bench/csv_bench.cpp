@@ -14,7 +14,7 @@
 #include <fmt/format.h>
 
 #include "common/calendar.h"
-#include "platform/csv_time_series.h"
+#include "platform/series/csv_time_series.h"
 
 namespace {
 

@@ -5,7 +5,7 @@
 #include <benchmark/benchmark.h>
 #include <fmt/format.h>
 
-#include "platform/kdx.h"
+#include "platform/kdx/kdx.h"
 
 namespace mirevo {
 namespace {

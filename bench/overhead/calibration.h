@@ -4,7 +4,7 @@
 #include <string>
 
 #include "evaluation/local_evaluator.h"
-#include "platform/posix_process_launcher.h"
+#include "platform/processes/posix_process_launcher.h"
 
 namespace mirevo::bench {
 

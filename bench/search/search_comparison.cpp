@@ -12,10 +12,10 @@
 
 #include <fmt/format.h>
 
-#include "algorithms/dds.h"
-#include "algorithms/proposal_selector.h"
-#include "algorithms/pse.h"
-#include "algorithms/sce.h"
+#include "algorithms/searches/dds.h"
+#include "algorithms/searches/pse.h"
+#include "algorithms/searches/sce.h"
+#include "algorithms/surrogate/proposal_selector.h"
 #include "algorithms/test_functions.h"
 
 namespace mirevo {

@@ -11,8 +11,8 @@
 #include <boost/multiprecision/cpp_bin_float.hpp>
 #include <fmt/format.h>
 
-#include "algorithms/special_functions.h"
-#include "algorithms/uniform_generator.h"
+#include "algorithms/numbers/special_functions.h"
+#include "algorithms/numbers/uniform_generator.h"
 
 namespace {
 

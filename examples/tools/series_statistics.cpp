@@ -20,7 +20,7 @@
 #include "common/text.h"
 #include "measures/dates.h"
 #include "measures/series_tables.h"
-#include "platform/time_series_object.h"
+#include "platform/series/time_series_object.h"
 #include "tools/goodness_of_fit.h"
 
 namespace mirevo::examples {

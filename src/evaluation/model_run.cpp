@@ -14,11 +14,11 @@
 
 #include "common/calendar.h"
 #include "common/fatal_error.h"
+#include "common/file_copy.h"
 #include "common/files.h"
 #include "common/text.h"
 #include "measures/measure_file.h"
-#include "platform/file_copy.h"
-#include "platform/process_folder.h"
+#include "platform/processes/process_folder.h"
 
 namespace mirevo {
 namespace {

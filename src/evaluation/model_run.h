@@ -15,7 +15,7 @@
 #include "measures/series_tables.h"
 #include "parameters/parameter_model.h"
 #include "parameters/template_file.h"
-#include "platform/process_launcher.h"
+#include "platform/processes/process_launcher.h"
 
 namespace mirevo {
 

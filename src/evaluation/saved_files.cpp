@@ -11,8 +11,8 @@
 
 #include <fmt/format.h>
 
+#include "common/file_copy.h"
 #include "common/text.h"
-#include "platform/file_copy.h"
 
 namespace mirevo {
 namespace {

@@ -5,7 +5,7 @@
 
 #include "common/date_record.h"
 #include "measures/output_measure.h"
-#include "platform/time_series_object.h"
+#include "platform/series/time_series_object.h"
 
 namespace mirevo {
 

@@ -7,7 +7,7 @@
 #include <vector>
 
 #include "measures/output_measure.h"
-#include "platform/time_series_object.h"
+#include "platform/series/time_series_object.h"
 
 namespace mirevo {
 

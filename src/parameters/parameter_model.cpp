@@ -9,7 +9,7 @@
 #include "common/fatal_error.h"
 #include "common/text.h"
 #include "parameters/dependency_order.h"
-#include "platform/expression_evaluator.h"
+#include "platform/equations/expression_evaluator.h"
 
 namespace mirevo {
 namespace {

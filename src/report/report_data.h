@@ -9,7 +9,7 @@
 
 #include "report/covariance_lines.h"
 #include "report/failure_reasons.h"
-#include "report/series_table.h"
+#include "run/results/series_table.h"
 
 namespace mirevo {
 

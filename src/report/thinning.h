@@ -4,7 +4,7 @@
 #include <span>
 #include <vector>
 
-#include "report/series_table.h"
+#include "run/results/series_table.h"
 
 namespace mirevo {
 

@@ -9,12 +9,12 @@
 
 #include <fmt/format.h>
 
-#include "platform/front_end.h"
-#include "platform/mpi_session.h"
+#include "common/version.h"
+#include "platform/jobs/mpi_session.h"
+#include "platform/terminal/front_end.h"
 #include "run/run_driver.h"
 #include "run/signal_handlers.h"
 #include "run/stop_run.h"
-#include "run/version.h"
 #include "viewer/qmon_start.h"
 
 namespace mirevo {

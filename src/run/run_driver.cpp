@@ -7,24 +7,25 @@
 #include <fmt/format.h>
 
 #include "common/calendar.h"
+#include "common/clock.h"
 #include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/text.h"
+#include "common/version.h"
 #include "evaluation/local_evaluator.h"
-#include "evaluation/mpi_evaluator.h"
+#include "evaluation/ranks/mpi_evaluator.h"
 #include "measures/period_series.h"
-#include "platform/posix_process_launcher.h"
-#include "run/mpi_start.h"
+#include "platform/processes/posix_process_launcher.h"
+#include "platform/terminal/front_end.h"
+#include "platform/signals/signal_state.h"
+#include "report/run_report.h"
 #include "run/run_model.h"
-#include "run/run_report.h"
-#include "run/setup_reader.h"
-#include "run/setup_summary.h"
-#include "run/setup_warnings.h"
+#include "run/setup/setup_reader.h"
+#include "run/setup/setup_summary.h"
+#include "run/setup/setup_warnings.h"
 #include "run/signal_handlers.h"
-#include "run/signal_state.h"
 #include "run/stop_run.h"
-#include "run/tasks.h"
-#include "run/version.h"
+#include "run/tasks/tasks.h"
 #include "run/worker_run.h"
 
 namespace mirevo {
@@ -53,7 +54,7 @@ RunDriver::~RunDriver() {
 
 int RunDriver::run(const std::string& setupFileName) {
   try {
-    startMpi(state_);
+    startMpi();
     if (state_.mpiRank > 0) return runWorker(state_.mpi);
     openRun(setupFileName);
     const std::string setupText = readSetupText(setupFileName);
@@ -80,6 +81,13 @@ int RunDriver::run(const std::string& setupFileName) {
   } catch (const std::exception& error) {
     return endInError("Error: Unexpected failure", error.what());
   }
+}
+
+void RunDriver::startMpi() {
+  state_.mpi.start();
+  state_.mpiRank = state_.mpi.rank();
+  state_.mpiProcessCount = state_.mpi.processCount();
+  state_.mpiInUse = state_.mpi.inUse();
 }
 
 void RunDriver::openRun(const std::string& setupFileName) {

@@ -11,15 +11,15 @@
 #include "evaluation/model_run.h"
 #include "measures/objective_functions.h"
 #include "parameters/parameter_model.h"
-#include "platform/process_launcher.h"
+#include "platform/processes/process_launcher.h"
 #include "report/report_data.h"
-#include "run/run_config.h"
-#include "run/run_lock.h"
+#include "run/results/run_lock.h"
+#include "run/results/run_results.h"
+#include "run/results/series_recorder.h"
 #include "run/run_reporter.h"
-#include "run/run_results.h"
 #include "run/run_state.h"
-#include "run/series_recorder.h"
-#include "run/tasks.h"
+#include "run/setup/run_config.h"
+#include "run/tasks/tasks.h"
 
 namespace mirevo {
 
@@ -36,6 +36,10 @@ class RunDriver final {
   int run(const std::string& setupFileName);
 
  private:
+  /// Settles the run's rank in its job: -1 and a plain local run without MPI or alone in its job. Throws FatalError
+  /// when a job launcher started several processes that MPI cannot bring together, as they would all write the same
+  /// files.
+  void startMpi();
   void openRun(const std::string& setupFileName);
   void buildModel();
   void logSetup();

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cmath>
 
+#include "common/clock.h"
 #include "common/fatal_error.h"
 
 namespace mirevo {

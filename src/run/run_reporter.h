@@ -4,17 +4,17 @@
 #include <string>
 #include <vector>
 
-#include "algorithms/search_algorithm.h"
+#include "algorithms/searches/search_algorithm.h"
 #include "evaluation/evaluation_observer.h"
 #include "measures/objective_functions.h"
 #include "parameters/search_space.h"
-#include "run/best_evaluation.h"
-#include "run/failed_run_file.h"
-#include "run/failure_summary.h"
-#include "run/result_file.h"
+#include "run/results/best_evaluation.h"
+#include "run/results/failed_run_file.h"
+#include "run/results/failure_summary.h"
+#include "run/results/result_file.h"
+#include "run/results/series_recorder.h"
+#include "run/results/simulated_values_file.h"
 #include "run/run_state.h"
-#include "run/series_recorder.h"
-#include "run/simulated_values_file.h"
 
 namespace mirevo {
 

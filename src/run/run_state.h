@@ -2,10 +2,10 @@
 
 #include <vector>
 
-#include "platform/front_end.h"
-#include "platform/mpi_session.h"
-#include "run/progress_reporter.h"
-#include "run/run_log.h"
+#include "common/clock.h"
+#include "platform/jobs/mpi_session.h"
+#include "run/progress/progress_reporter.h"
+#include "run/progress/run_log.h"
 
 namespace mirevo {
 

@@ -10,14 +10,11 @@
 #include <ucontext.h>
 #include <unistd.h>
 
-#include "platform/front_end.h"
-#include "run/signal_state.h"
+#include "platform/signals/signal_state.h"
+#include "platform/terminal/front_end.h"
 
 namespace mirevo {
 namespace {
-
-constexpr std::string_view kInterrupted = "Control-C send";
-constexpr std::string_view kTerminationRequest = "Termination request";
 
 /// Handlers run here, so that a stack overflow can still be reported.
 alignas(16) std::array<char, 65536> handlerStack;
@@ -103,11 +100,8 @@ extern "C" void handleFloatingPoint(int signalNumber, siginfo_t* information, vo
 
 using SignalAction = void (*)(int, siginfo_t*, void*);
 
-/// Those that ask the run to end, rather than tell of its crash.
-constexpr std::array kRequests{SIGINT, SIGTERM, SIGHUP, SIGQUIT, SIGXCPU};
-
 bool isRequest(int signalNumber) {
-  return std::find(kRequests.begin(), kRequests.end(), signalNumber) != kRequests.end();
+  return std::find(kEndingRequests.begin(), kEndingRequests.end(), signalNumber) != kEndingRequests.end();
 }
 
 /// Whoever started the program may have blocked the signal.
@@ -131,22 +125,6 @@ bool isIgnored(int signalNumber) {
 
 }  // namespace
 
-void writeLineFromSignal(int descriptor, std::string_view text, std::string_view prefix) noexcept {
-  const int savedError = errno;
-  std::array<char, 512> line;
-  std::size_t length = 0;
-  for (const std::string_view part : {prefix, text})
-    length += part.copy(line.data() + length, line.size() - 1 - length);
-  line[length++] = '\n';
-  std::string_view rest(line.data(), length);
-  while (!rest.empty()) {
-    const ssize_t written = ::write(descriptor, rest.data(), rest.size());
-    if (written < 0 && errno != EINTR) break;
-    if (written > 0) rest.remove_prefix(static_cast<std::size_t>(written));
-  }
-  errno = savedError;
-}
-
 int floatingPointSubCode(int signalCode) noexcept {
   switch (signalCode) {
     case FPE_FLTINV:
@@ -163,10 +141,6 @@ int floatingPointSubCode(int signalCode) noexcept {
     default:
       return fpe::kOther;
   }
-}
-
-bool isEndingRequest(std::string_view message) noexcept {
-  return message == kInterrupted || message == kTerminationRequest;
 }
 
 std::string_view floatingPointMessage(int subCode) noexcept {
@@ -211,23 +185,6 @@ void installSignalHandlers() {
   // A reader of our output that goes away, or a limit on file sizes: the write that fails says so.
   ::signal(SIGPIPE, SIG_IGN);
   ::signal(SIGXFSZ, SIG_IGN);
-}
-
-EndingSignalsHeld::EndingSignalsHeld() {
-  sigset_t held;
-  ::sigemptyset(&held);
-  for (const int signalNumber : kRequests) ::sigaddset(&held, signalNumber);
-  ::sigprocmask(SIG_BLOCK, &held, &before_);
-  if (signalState.heldSteps++ > 0 || !signalState.isEnding) return;
-  // Another thread ends the run, or has just handed that on to this one: no further step begins.
-  --signalState.heldSteps;
-  ::sigprocmask(SIG_SETMASK, &before_, nullptr);
-  for (;;) ::pause();
-}
-
-EndingSignalsHeld::~EndingSignalsHeld() {
-  --signalState.heldSteps;
-  ::sigprocmask(SIG_SETMASK, &before_, nullptr);
 }
 
 }  // namespace mirevo

@@ -11,22 +11,6 @@ namespace mirevo {
 /// storage access.
 void installSignalHandlers();
 
-/// Whether a run that left this message was asked by a signal to end, rather than crashed.
-bool isEndingRequest(std::string_view message) noexcept;
-
-/// While one exists the requests to end the run wait, so that no file is left in the middle of a step. For the main
-/// thread; they may be nested.
-class EndingSignalsHeld final {
- public:
-  EndingSignalsHeld();
-  ~EndingSignalsHeld();
-  EndingSignalsHeld(const EndingSignalsHeld&) = delete;
-  EndingSignalsHeld& operator=(const EndingSignalsHeld&) = delete;
-
- private:
-  sigset_t before_;
-};
-
 /// Sub-codes of a floating-point signal.
 namespace fpe {
 inline constexpr int kInvalid = 129;

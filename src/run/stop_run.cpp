@@ -7,9 +7,9 @@
 
 #include <fmt/format.h>
 
-#include "platform/front_end.h"
+#include "platform/signals/signal_state.h"
+#include "platform/terminal/front_end.h"
 #include "run/signal_handlers.h"
-#include "run/signal_state.h"
 
 namespace mirevo {
 

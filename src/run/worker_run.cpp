@@ -6,14 +6,14 @@
 #include <fmt/format.h>
 
 #include "common/fatal_error.h"
-#include "evaluation/mpi_worker.h"
+#include "evaluation/ranks/mpi_worker.h"
 #include "parameters/parameter_model.h"
-#include "platform/front_end.h"
-#include "platform/posix_process_launcher.h"
+#include "platform/processes/posix_process_launcher.h"
+#include "platform/signals/signal_state.h"
+#include "platform/terminal/front_end.h"
 #include "run/run_model.h"
-#include "run/setup_reader.h"
+#include "run/setup/setup_reader.h"
 #include "run/signal_handlers.h"
-#include "run/signal_state.h"
 
 namespace mirevo {
 namespace {

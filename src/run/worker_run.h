@@ -1,6 +1,6 @@
 #pragma once
 
-#include "platform/mpi_session.h"
+#include "platform/jobs/mpi_session.h"
 
 namespace mirevo {
 

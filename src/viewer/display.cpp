@@ -3,7 +3,7 @@
 #include <array>
 #include <signal.h>
 
-#include "platform/terminal.h"
+#include "platform/terminal/terminal.h"
 
 namespace mirevo {
 namespace {

@@ -11,8 +11,8 @@
 
 #include <fmt/format.h>
 
-#include "platform/front_end.h"
-#include "platform/terminal.h"
+#include "platform/terminal/front_end.h"
+#include "platform/terminal/terminal.h"
 #include "viewer/run_process.h"
 #include "viewer/viewer.h"
 

@@ -12,8 +12,9 @@
 
 #include <fmt/format.h>
 
+#include "common/clock.h"
 #include "common/text.h"
-#include "platform/front_end.h"
+#include "platform/terminal/front_end.h"
 
 namespace mirevo {
 namespace {

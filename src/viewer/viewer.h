@@ -5,7 +5,7 @@
 #include <string_view>
 #include <vector>
 
-#include "platform/terminal.h"
+#include "platform/terminal/terminal.h"
 #include "viewer/display.h"
 #include "viewer/message_file.h"
 #include "viewer/run_process.h"

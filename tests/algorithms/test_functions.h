@@ -9,8 +9,8 @@
 #include <utility>
 #include <vector>
 
-#include "algorithms/search_algorithm.h"
-#include "algorithms/uniform_generator.h"
+#include "algorithms/numbers/uniform_generator.h"
+#include "algorithms/searches/search_algorithm.h"
 #include "evaluation/evaluator.h"
 
 /// Published test functions of global optimisation, and an evaluator over one of them. Used by the tests and by the

@@ -5,8 +5,8 @@
 #include <string>
 #include <vector>
 
-#include "evaluation/rank_messages.h"
-#include "platform/message_channel.h"
+#include "evaluation/ranks/rank_messages.h"
+#include "platform/jobs/message_channel.h"
 
 namespace mirevo {
 

@@ -7,7 +7,7 @@
 #include <string>
 #include <vector>
 
-#include "platform/process_launcher.h"
+#include "platform/processes/process_launcher.h"
 
 namespace mirevo {
 

@@ -4,7 +4,7 @@
 #include <cstdlib>
 #include <string>
 
-#include "platform/csv_time_series.h"
+#include "platform/series/csv_time_series.h"
 
 namespace {
 

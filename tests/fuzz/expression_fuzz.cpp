@@ -6,7 +6,7 @@
 #include <vector>
 
 #include "common/fatal_error.h"
-#include "platform/expression_evaluator.h"
+#include "platform/equations/expression_evaluator.h"
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
   static std::vector<std::string> names{"a", "b", "max", "x 1", "2k", "e"};

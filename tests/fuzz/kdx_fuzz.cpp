@@ -5,8 +5,8 @@
 #include <string_view>
 
 #include "common/fatal_error.h"
-#include "platform/kdx.h"
-#include "run/setup_reader.h"
+#include "platform/kdx/kdx.h"
+#include "run/setup/setup_reader.h"
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
   const std::string_view text(reinterpret_cast<const char*>(data), size);

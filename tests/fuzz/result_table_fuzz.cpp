@@ -6,8 +6,8 @@
 #include <cstdlib>
 #include <string>
 
-#include "common/result_table.h"
 #include "common/text.h"
+#include "run/results/result_table.h"
 
 namespace {
 

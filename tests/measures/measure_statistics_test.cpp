@@ -6,8 +6,8 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "platform/csv_time_series.h"
-#include "platform/memory_time_series.h"
+#include "platform/series/csv_time_series.h"
+#include "platform/series/memory_time_series.h"
 #include "refusal.h"
 
 namespace mirevo {

@@ -7,7 +7,7 @@
 #include <gtest/gtest.h>
 
 #include "common/calendar.h"
-#include "platform/memory_time_series.h"
+#include "platform/series/memory_time_series.h"
 
 namespace mirevo {
 namespace {

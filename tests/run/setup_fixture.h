@@ -7,7 +7,7 @@
 
 #include "common/files.h"
 #include "refusal.h"
-#include "run/setup_reader.h"
+#include "run/setup/setup_reader.h"
 #include "temporary_folder.h"
 
 namespace mirevo {

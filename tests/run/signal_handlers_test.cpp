@@ -13,7 +13,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "run/signal_state.h"
+#include "platform/signals/signal_state.h"
 #include "run/stop_run.h"
 #include "temporary_folder.h"
 

@@ -1,0 +1,225 @@
+#include "algorithms/analyses/covariance.h"
+
+#include <algorithm>
+#include <cassert>
+#include <cmath>
+#include <limits>
+
+#include <boost/math/distributions/students_t.hpp>
+#include <fmt/format.h>
+
+#include "algorithms/numbers/lapack.h"
+#include "algorithms/numbers/sample_summary.h"
+
+namespace mirevo {
+
+namespace {
+
+constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
+constexpr double kWarnAboveCorrelation = 0.95;
+
+/// Squared length of a column of length 1 that is left when the columns before it are taken out of it. Differences of a
+/// model's output carry no more than 6 to 8 digits, so that anything smaller is their noise.
+constexpr double kSmallestPivot = 1.0e-12;
+
+/// Square root of W times J and r, without the rows that have no residual.
+struct WeightedModel {
+  std::vector<std::vector<double>> columns;
+  std::vector<double> residuals;
+};
+
+WeightedModel weighRows(const LinearisedModel& model) {
+  assert(model.weights.empty() || model.weights.size() == model.residuals.size());
+  WeightedModel weighted;
+  weighted.columns.resize(model.jacobian.size());
+  for (std::size_t i = 0; i < model.residuals.size(); ++i) {
+    if (!std::isfinite(model.residuals[i])) continue;
+    const double root = model.weights.empty() ? 1.0 : std::sqrt(model.weights[i]);
+    weighted.residuals.push_back(root * model.residuals[i]);
+    for (std::size_t j = 0; j < model.jacobian.size(); ++j) {
+      weighted.columns[j].push_back(root * model.jacobian[j][i]);
+    }
+  }
+  return weighted;
+}
+
+double dot(std::span<const double> a, std::span<const double> b) {
+  double sum = 0.0;
+  for (std::size_t i = 0; i < a.size(); ++i) sum += a[i] * b[i];
+  return sum;
+}
+
+/// Scales a column to length 1 and returns the length it had, by way of its largest entry, so that squares neither
+/// overflow nor vanish. Leaves a zero column as it is.
+double normalise(std::vector<double>& column) {
+  double largest = 0.0;
+  for (const double value : column) largest = std::max(largest, std::abs(value));
+  if (largest == 0.0) return 0.0;
+  for (double& value : column) value /= largest;
+  const double length = std::sqrt(dot(column, column));
+  for (double& value : column) value /= length;
+  return largest * length;
+}
+
+/// J'WJ of the given normalised columns, k x k; its diagonal is 1.
+std::vector<double> gramMatrix(const std::vector<std::vector<double>>& columns, std::span<const std::size_t> kept) {
+  const std::size_t k = kept.size();
+  std::vector<double> gram(k * k);
+  for (std::size_t i = 0; i < k; ++i) {
+    for (std::size_t j = 0; j <= i; ++j) {
+      gram[i * k + j] = gram[j * k + i] = dot(columns[kept[i]], columns[kept[j]]);
+    }
+  }
+  return gram;
+}
+
+/// Factorises the Gram matrix in place; the 0-based position of the first parameter that depends on those before it, or
+/// k when there is none.
+std::size_t factorise(std::vector<double>& gram, std::size_t k) {
+  const int n = static_cast<int>(k);
+  int info = 0;
+  useOneLapackThread();
+  dpotrf_("U", &n, gram.data(), &n, &info);
+  const std::size_t sound = info > 0 ? static_cast<std::size_t>(info - 1) : k;
+  for (std::size_t i = 0; i < sound; ++i) {
+    const double pivot = gram[i * k + i];
+    if (!(pivot * pivot > kSmallestPivot)) return i;
+  }
+  return sound;
+}
+
+/// Removes what cannot have a variance, and leaves the inverse of the Gram matrix of the rest.
+std::vector<double> invertWhatCanBe(const WeightedModel& weighted, std::span<const double> lengths,
+                                    ParameterCovariance& result) {
+  for (std::size_t j = 0; j < lengths.size(); ++j) {
+    if (!std::isfinite(lengths[j])) {
+      result.leftOut.push_back({j, "its derivatives are not known"});
+    } else if (lengths[j] == 0.0) {
+      result.leftOut.push_back({j, "no simulated value depends on it"});
+    } else {
+      result.kept.push_back(j);
+    }
+  }
+  std::vector<double> gram;
+  for (;;) {
+    const std::size_t k = result.kept.size();
+    gram = gramMatrix(weighted.columns, result.kept);
+    const std::size_t dependent = k == 0 ? 0 : factorise(gram, k);
+    if (dependent == k) break;
+    result.leftOut.push_back(
+        {result.kept[dependent], "its effect cannot be told from that of the parameters before it"});
+    result.kept.erase(result.kept.begin() + static_cast<std::ptrdiff_t>(dependent));
+  }
+  if (!gram.empty()) {
+    const int n = static_cast<int>(result.kept.size());
+    int info = 0;
+    dpotri_("U", &n, gram.data(), &n, &info);
+    assert(info == 0);
+  }
+  std::sort(result.leftOut.begin(), result.leftOut.end(),
+            [](const LeftOutParameter& a, const LeftOutParameter& b) { return a.index < b.index; });
+  return gram;
+}
+
+}  // namespace
+
+ParameterCovariance parameterCovariance(const LinearisedModel& model) {
+  WeightedModel weighted = weighRows(model);
+  ParameterCovariance result;
+  result.observationCount = weighted.residuals.size();
+  std::vector<double> lengths;
+  for (std::vector<double>& column : weighted.columns) {
+    const bool isKnown = std::all_of(column.begin(), column.end(), [](double value) { return std::isfinite(value); });
+    lengths.push_back(isKnown ? normalise(column) : kNaN);
+  }
+  const std::vector<double> inverse = invertWhatCanBe(weighted, lengths, result);
+
+  const std::size_t k = result.kept.size();
+  const std::size_t n = result.observationCount;
+  result.degreesOfFreedom = n > k ? n - k : 0;
+  const bool hasVariance = result.degreesOfFreedom > 0;
+  const auto degrees = static_cast<double>(result.degreesOfFreedom);
+  result.errorVariance = hasVariance ? dot(weighted.residuals, weighted.residuals) / degrees : kNaN;
+  result.tQuantile = hasVariance ? boost::math::quantile(boost::math::students_t(degrees), 0.975) : kNaN;
+
+  result.covariance.assign(k, std::vector<double>(k));
+  result.correlation.assign(k, std::vector<double>(k, 1.0));
+  for (std::size_t i = 0; i < k; ++i) {
+    for (std::size_t j = 0; j <= i; ++j) {
+      // The upper triangle in Fortran's order of columns.
+      const double entry = inverse[i * k + j];
+      const double scale = lengths[result.kept[i]] * lengths[result.kept[j]];
+      result.covariance[i][j] = result.covariance[j][i] = result.errorVariance * entry / scale;
+      if (i != j) {
+        const double r = entry / std::sqrt(inverse[i * k + i]) / std::sqrt(inverse[j * k + j]);
+        result.correlation[i][j] = result.correlation[j][i] = std::clamp(r, -1.0, 1.0);
+      }
+    }
+    const double length = lengths[result.kept[i]];
+    result.standardDeviations.push_back(std::sqrt(result.errorVariance * inverse[i * k + i]) / length);
+  }
+  return result;
+}
+
+std::vector<ParameterLimits> parameterLimits(const ParameterCovariance& covariance, const SearchSpace& space,
+                                             std::span<const double> set) {
+  std::vector<ParameterLimits> limits;
+  for (std::size_t i = 0; i < covariance.kept.size(); ++i) {
+    const std::size_t j = covariance.kept[i];
+    const double deviation = covariance.standardDeviations[i];
+    const double reach = covariance.tQuantile * deviation;
+    // An integer parameter's limits are not moved to whole numbers: they are those of a continuous quantity.
+    if (space.transformation[j] == TransformationType::logarithmic) {
+      const double value = std::exp(set[j]);
+      limits.push_back({value, value * deviation, std::exp(set[j] - reach), std::exp(set[j] + reach)});
+    } else {
+      limits.push_back({set[j], deviation, set[j] - reach, set[j] + reach});
+    }
+  }
+  return limits;
+}
+
+std::vector<std::string> formatCovariance(const ParameterCovariance& covariance, const SearchSpace& space,
+                                          std::span<const double> set) {
+  std::vector<std::string> lines;
+  lines.push_back(fmt::format("Parameter covariance: {} observations, {} parameters, {} degrees of freedom",
+                              covariance.observationCount, covariance.kept.size(), covariance.degreesOfFreedom));
+  for (const LeftOutParameter& parameter : covariance.leftOut) {
+    lines.push_back(fmt::format("Warning: Parameter {} is left out of the covariance matrix: {}",
+                                space.names[parameter.index], parameter.reason));
+  }
+  if (covariance.kept.empty()) return lines;
+  if (covariance.degreesOfFreedom == 0) {
+    lines.emplace_back("Warning: No covariance matrix: there must be more observations than parameters");
+    return lines;
+  }
+  lines.push_back(fmt::format("Standard error of a residual: {:.6g}", std::sqrt(covariance.errorVariance)));
+
+  std::vector<std::string> names;
+  for (const std::size_t j : covariance.kept) names.push_back(space.names[j]);
+  const auto append = [&](const std::string& title, std::span<const std::string> headings,
+                          std::span<const std::vector<double>> rows) {
+    lines.emplace_back();
+    for (std::string& line : formatTable(title, headings, names, rows)) lines.push_back(std::move(line));
+  };
+  std::vector<std::vector<double>> rows;
+  for (const ParameterLimits& limits : parameterLimits(covariance, space, set)) {
+    rows.push_back({limits.value, limits.standardDeviation, limits.lower, limits.upper});
+  }
+  const std::string headings[] = {"Value", "Std. deviation", "95 % lower", "95 % upper"};
+  append("Parameter (model scale)", headings, rows);
+  append("Covariance (search scale)", names, covariance.covariance);
+  append("Correlation", names, covariance.correlation);
+  for (std::size_t i = 0; i < names.size(); ++i) {
+    for (std::size_t j = 0; j < i; ++j) {
+      if (!(std::abs(covariance.correlation[i][j]) > kWarnAboveCorrelation)) continue;
+      lines.push_back(
+          fmt::format("Warning: Parameters {} and {} are correlated by {:.4f}: the observations hardly tell "
+                      "them apart",
+                      names[j], names[i], covariance.correlation[i][j]));
+    }
+  }
+  return lines;
+}
+
+}  // namespace mirevo

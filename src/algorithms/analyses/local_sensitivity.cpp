@@ -1,0 +1,236 @@
+#include "algorithms/analyses/local_sensitivity.h"
+
+#include <algorithm>
+#include <cassert>
+#include <cmath>
+#include <limits>
+#include <numeric>
+
+#include <fmt/format.h>
+
+namespace mirevo {
+
+namespace {
+
+constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
+constexpr std::int32_t kCentral = 1;
+constexpr std::int32_t kOfValue = 1;
+
+/// How far a parameter may and should move, on the search scale.
+struct Step {
+  double up = 0.0;
+  double down = 0.0;
+  double roomUp = 0.0;
+  double roomDown = 0.0;
+  double extent = 0.0;
+};
+
+Step wantedStep(const SensitivitySettings& settings, const SearchSpace& space, std::span<const double> base,
+                std::size_t j) {
+  const TransformationType type = space.transformation[j];
+  // The search space's upper bound of an integer parameter lies one above the largest value.
+  const double upper = type == TransformationType::integer ? space.upper[j] - 1.0 : space.upper[j];
+  const double fraction = settings.perturbationFraction;
+  Step step;
+  step.roomUp = std::max(upper - base[j], 0.0);
+  step.roomDown = std::max(base[j] - space.lower[j], 0.0);
+  if (settings.perturbationOption != kOfValue) {
+    step.extent = upper - space.lower[j];
+    step.up = step.down = fraction * step.extent;
+  } else if (type == TransformationType::logarithmic) {
+    // x (1 + f) and x / (1 + f): the same step either way. The derivative by ln x is already x times that by x.
+    step.extent = 1.0;
+    step.up = step.down = std::log1p(fraction);
+  } else {
+    step.extent = std::abs(base[j]);
+    step.up = step.down = fraction * step.extent;
+  }
+  if (type == TransformationType::integer && step.extent > 0.0) {
+    step.up = step.down = std::max(1.0, std::round(step.up));
+    step.roomUp = std::floor(step.roomUp);
+    step.roomDown = std::floor(step.roomDown);
+  }
+  return step;
+}
+
+/// Adds the sets that the differences by parameter j need.
+ParameterDifference planDifference(const Step& step, bool central, std::size_t j, std::vector<ParameterSet>& sets) {
+  const auto addSet = [&](double value) {
+    sets.push_back(sets.front());
+    sets.back()[j] = value;
+    return sets.size() - 1;
+  };
+  const double x = sets.front()[j];
+  ParameterDifference difference;
+  difference.extent = step.extent;
+  if (step.up == 0.0) {
+    difference.problem = step.roomUp + step.roomDown == 0.0
+                             ? "its bounds are equal"
+                             : "its value is 0, and the perturbation is a fraction of it";
+    return difference;
+  }
+  const bool fitsUp = step.up <= step.roomUp;
+  const bool fitsDown = step.down <= step.roomDown;
+  if (central && fitsUp && fitsDown) {
+    difference.minus = addSet(x - step.down);
+    difference.plus = addSet(x + step.up);
+  } else if (fitsUp || (!fitsDown && step.roomUp >= step.roomDown && step.roomUp > 0.0)) {
+    difference.plus = addSet(x + std::min(step.up, step.roomUp));
+  } else if (step.roomDown > 0.0) {
+    difference.minus = addSet(x - std::min(step.down, step.roomDown));
+  } else {
+    difference.problem = "its bounds are equal";
+    return difference;
+  }
+  // The width as rounded, so that it is that of the sets that are run.
+  difference.width = sets[difference.plus][j] - sets[difference.minus][j];
+  if (!(difference.width > 0.0)) difference.problem = "the perturbation is too small to change its value";
+  return difference;
+}
+
+SensitivityTable tabulate(const PerturbationPlan& plan, std::span<const EvaluationResult> results,
+                          std::vector<double> EvaluationResult::*values) {
+  std::vector<std::vector<double>> outputs;
+  for (const EvaluationResult& result : results) {
+    outputs.push_back(result.ok() ? result.*values : std::vector<double>{});
+  }
+  SensitivityTable table;
+  const EvaluationResult& base = results.front();
+  table.base = base.ok() ? base.*values : std::vector<double>((base.*values).size(), kNaN);
+  table.derivatives = differenceColumns(plan, outputs);
+  for (std::size_t j = 0; j < plan.differences.size(); ++j) {
+    table.derivatives[j].resize(table.base.size(), kNaN);
+    std::vector<double> scaled;
+    double squares = 0.0;
+    std::size_t known = 0;
+    for (std::size_t i = 0; i < table.base.size(); ++i) {
+      const double size = std::abs(table.base[i]);
+      scaled.push_back(size > 0.0 ? table.derivatives[j][i] * plan.differences[j].extent / size : kNaN);
+      if (!std::isfinite(scaled.back())) continue;
+      squares += scaled.back() * scaled.back();
+      ++known;
+    }
+    table.composite.push_back(known == 0 ? kNaN : std::sqrt(squares / static_cast<double>(known)));
+    table.scaled.push_back(std::move(scaled));
+  }
+  return table;
+}
+
+void noteFailures(PerturbationPlan& plan, std::span<const EvaluationResult> results) {
+  for (ParameterDifference& difference : plan.differences) {
+    for (const std::size_t set : {difference.minus, difference.plus}) {
+      if (!difference.problem.empty() || results[set].ok()) continue;
+      difference.problem = fmt::format("evaluation {} failed: {}", results[set].number, results[set].failure->reason);
+    }
+  }
+}
+
+std::vector<std::size_t> rank(std::span<const double> composite) {
+  std::vector<std::size_t> order(composite.size());
+  std::iota(order.begin(), order.end(), std::size_t{0});
+  std::stable_sort(order.begin(), order.end(), [&](std::size_t a, std::size_t b) {
+    if (std::isnan(composite[a]) || std::isnan(composite[b]))
+      return !std::isnan(composite[a]) && std::isnan(composite[b]);
+    return composite[a] > composite[b];
+  });
+  return order;
+}
+
+void appendTable(std::vector<std::string>& lines, const std::string& title, std::span<const std::string> outputs,
+                 std::span<const std::string> parameters, std::span<const std::vector<double>> rows) {
+  lines.emplace_back();
+  for (std::string& line : formatTable(title, outputs, parameters, rows)) lines.push_back(std::move(line));
+}
+
+}  // namespace
+
+PerturbationPlan planPerturbations(const SensitivitySettings& settings, const SearchSpace& space,
+                                   std::span<const double> base) {
+  PerturbationPlan plan;
+  plan.sets.emplace_back(base.begin(), base.end());
+  for (std::size_t j = 0; j < space.size(); ++j) {
+    const Step step = wantedStep(settings, space, base, j);
+    plan.differences.push_back(planDifference(step, settings.differencing == kCentral, j, plan.sets));
+  }
+  return plan;
+}
+
+bool hasRoomForStep(const SensitivitySettings& settings, const SearchSpace& space, std::size_t j) {
+  constexpr double kRounding = 1.0 + 1.0e-12;
+  const Step step = wantedStep(settings, space, space.initial, j);
+  return step.up <= step.roomUp * kRounding || step.down <= step.roomDown * kRounding;
+}
+
+LocalSensitivity localSensitivity(const SensitivitySettings& settings, const SearchSpace& space, Evaluator& evaluator) {
+  LocalSensitivity sensitivity;
+  sensitivity.plan = planPerturbations(settings, space, space.initial);
+  sensitivity.results = evaluator.evaluateParameterSets(sensitivity.plan.sets, DispatchMode::task);
+  noteFailures(sensitivity.plan, sensitivity.results);
+  sensitivity.measures = tabulate(sensitivity.plan, sensitivity.results, &EvaluationResult::measureValues);
+  sensitivity.objectives = tabulate(sensitivity.plan, sensitivity.results, &EvaluationResult::objectiveValues);
+  const bool hasObjectives = !sensitivity.objectives.base.empty();
+  sensitivity.ranking = rank(hasObjectives ? sensitivity.objectives.composite : sensitivity.measures.composite);
+  return sensitivity;
+}
+
+std::vector<std::vector<double>> differenceColumns(const PerturbationPlan& plan,
+                                                   std::span<const std::vector<double>> outputs) {
+  assert(outputs.size() == plan.sets.size());
+  std::size_t count = 0;
+  for (const std::vector<double>& values : outputs) count = std::max(count, values.size());
+  std::vector<std::vector<double>> columns;
+  for (const ParameterDifference& difference : plan.differences) {
+    const std::vector<double>& minus = outputs[difference.minus];
+    const std::vector<double>& plus = outputs[difference.plus];
+    std::vector<double> column(count, kNaN);
+    if (difference.problem.empty() && minus.size() == count && plus.size() == count) {
+      for (std::size_t i = 0; i < count; ++i) column[i] = (plus[i] - minus[i]) / difference.width;
+    }
+    columns.push_back(std::move(column));
+  }
+  return columns;
+}
+
+std::optional<LinearisedModel> linearise(const PerturbationPlan& plan,
+                                         std::span<const std::vector<double>> simulatedValues,
+                                         std::span<const double> observedValues, std::vector<double> weights) {
+  const std::vector<double>& base = simulatedValues.front();
+  if (base.size() != observedValues.size()) return std::nullopt;
+  LinearisedModel model;
+  for (std::size_t i = 0; i < base.size(); ++i) model.residuals.push_back(base[i] - observedValues[i]);
+  model.weights = std::move(weights);
+  model.jacobian = differenceColumns(plan, simulatedValues);
+  return model;
+}
+
+std::vector<std::string> formatSensitivity(const LocalSensitivity& sensitivity, const AnalysisNames& names) {
+  std::vector<std::string> lines{"Local sensitivity analysis"};
+  for (std::size_t j = 0; j < names.parameters.size(); ++j) {
+    const std::string& problem = sensitivity.plan.differences[j].problem;
+    if (problem.empty()) continue;
+    lines.push_back(fmt::format("Warning: Parameter {} has no derivatives: {}", names.parameters[j], problem));
+  }
+  const auto appendBoth = [&](const std::string& what, const SensitivityTable& table,
+                              std::span<const std::string> outputs) {
+    if (outputs.empty()) return;
+    appendTable(lines, "Derivatives of " + what, outputs, names.parameters, table.derivatives);
+    appendTable(lines, "Scaled sensitivities of " + what, outputs, names.parameters, table.scaled);
+  };
+  appendBoth("output measures", sensitivity.measures, names.measures);
+  appendBoth("objective functions", sensitivity.objectives, names.objectives);
+
+  const bool hasObjectives = !names.objectives.empty();
+  const std::vector<double>& composite =
+      hasObjectives ? sensitivity.objectives.composite : sensitivity.measures.composite;
+  std::vector<std::string> ranked;
+  std::vector<std::vector<double>> rows;
+  for (const std::size_t j : sensitivity.ranking) {
+    ranked.push_back(fmt::format("{:>3}. {}", ranked.size() + 1, names.parameters[j]));
+    rows.push_back({composite[j]});
+  }
+  const std::string headings[] = {"Composite scaled sensitivity"};
+  appendTable(lines, "Ranking", headings, ranked, rows);
+  return lines;
+}
+
+}  // namespace mirevo

@@ -1,0 +1,118 @@
+#include "algorithms/analyses/uncertainty.h"
+
+#include <algorithm>
+#include <numeric>
+
+#include <fmt/format.h>
+
+#include "algorithms/numbers/uniform_generator.h"
+
+namespace mirevo {
+
+namespace {
+
+constexpr std::int32_t kLatinHypercube = 1;
+
+/// Moves deviate i into stratum (pi_i - 1, pi_i) / N, pi_i being its rank among the deviates, from 1, equal ones by
+/// index.
+void stratify(std::vector<double>& deviates, UniformGenerator& random) {
+  std::vector<std::size_t> order(deviates.size());
+  std::iota(order.begin(), order.end(), std::size_t{0});
+  std::stable_sort(order.begin(), order.end(), [&](std::size_t a, std::size_t b) { return deviates[a] < deviates[b]; });
+  std::vector<std::size_t> rank(deviates.size());
+  for (std::size_t k = 0; k < order.size(); ++k) rank[order[k]] = k + 1;
+  const auto n = static_cast<double>(deviates.size());
+  for (std::size_t i = 0; i < deviates.size(); ++i) deviates[i] = (static_cast<double>(rank[i]) - random.next()) / n;
+}
+
+/// One summary a column; `column(i)` gives evaluation i's values.
+template <typename ValuesOf>
+std::vector<SampleSummary> summariseColumns(std::size_t count, const ValuesOf& valuesOf) {
+  std::vector<std::vector<double>> columns;
+  for (std::size_t i = 0; i < count; ++i) {
+    const std::vector<double>& values = valuesOf(i);
+    if (columns.size() < values.size()) columns.resize(values.size());
+    for (std::size_t j = 0; j < values.size(); ++j) columns[j].push_back(values[j]);
+  }
+  std::vector<SampleSummary> summaries;
+  summaries.reserve(columns.size());
+  for (const std::vector<double>& column : columns) summaries.push_back(summariseSample(column));
+  return summaries;
+}
+
+void appendSummaries(std::vector<std::string>& lines, const std::string& title, std::span<const std::string> names,
+                     std::span<const SampleSummary> summaries) {
+  std::vector<std::string> headings{"Mean", "Std. deviation"};
+  for (const double p : kSummaryProbabilities) headings.push_back(fmt::format("{:g} %", 100.0 * p));
+  std::vector<std::vector<double>> rows;
+  for (const SampleSummary& summary : summaries) {
+    rows.push_back({summary.mean, summary.standardDeviation});
+    rows.back().insert(rows.back().end(), summary.quantiles.begin(), summary.quantiles.end());
+  }
+  lines.emplace_back();
+  for (std::string& line : formatTable(title, headings, names, rows)) lines.push_back(std::move(line));
+}
+
+}  // namespace
+
+std::vector<ParameterSet> uncertaintySample(const UncertaintySettings& settings, std::int32_t seed,
+                                            const MessageSink& messages) {
+  UniformGenerator random(seed);
+  const auto n = static_cast<std::size_t>(std::max(settings.sampleSize, 0));
+  std::vector<ParameterSet> sample(n, ParameterSet(settings.parameters.size()));
+  std::vector<double> deviates(n);
+  for (std::size_t j = 0; j < settings.parameters.size(); ++j) {
+    for (double& deviate : deviates) deviate = random.next();
+    if (settings.uncertaintyType == kLatinHypercube) stratify(deviates, random);
+    const NormalDistribution& distribution = settings.parameters[j];
+    for (std::size_t i = 0; i < n; ++i) {
+      int fault = 0;
+      const double z = normalQuantile(deviates[i], fault, messages);
+      sample[i][j] = distribution.standardDeviation * z + distribution.mean;
+    }
+  }
+  return sample;
+}
+
+UncertaintyOutcome uncertaintyAnalysis(const UncertaintySettings& settings, std::int32_t seed, Evaluator& evaluator,
+                                       const MessageSink& messages) {
+  UncertaintyOutcome outcome;
+  if (!settings.parameters.empty()) outcome.sample = uncertaintySample(settings, seed, messages);
+  outcome.results = evaluator.evaluateParameterSets(outcome.sample, DispatchMode::task);
+  return outcome;
+}
+
+UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome) {
+  std::vector<const EvaluationResult*> successful;
+  for (const EvaluationResult& result : outcome.results) {
+    if (result.ok()) successful.push_back(&result);
+  }
+  UncertaintySummary summary;
+  summary.evaluationCount = outcome.results.size();
+  summary.failedCount = outcome.results.size() - successful.size();
+  summary.parameters = summariseColumns(
+      outcome.sample.size(), [&](std::size_t i) -> auto& { return outcome.sample[i]; });
+  summary.correlations = correlationMatrix(outcome.sample);
+  summary.measures = summariseColumns(
+      successful.size(), [&](std::size_t i) -> auto& { return successful[i]->measureValues; });
+  summary.objectives = summariseColumns(
+      successful.size(), [&](std::size_t i) -> auto& { return successful[i]->objectiveValues; });
+  return summary;
+}
+
+std::vector<std::string> formatUncertainty(const UncertaintySummary& summary, const AnalysisNames& names) {
+  std::vector<std::string> lines;
+  lines.push_back(fmt::format("Uncertainty analysis: {} evaluations, {} failed and left out of the statistics",
+                              summary.evaluationCount, summary.failedCount));
+  appendSummaries(lines, "Parameter (search scale)", names.parameters, summary.parameters);
+  appendSummaries(lines, "Output measure", names.measures, summary.measures);
+  appendSummaries(lines, "Objective function", names.objectives, summary.objectives);
+  lines.emplace_back();
+  for (std::string& line :
+       formatTable("Sample correlation", names.parameters, names.parameters, summary.correlations)) {
+    lines.push_back(std::move(line));
+  }
+  return lines;
+}
+
+}  // namespace mirevo

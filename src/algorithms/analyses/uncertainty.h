@@ -1,0 +1,53 @@
+#pragma once
+
+#include <cstdint>
+#include <span>
+#include <string>
+#include <vector>
+
+#include "algorithms/analyses/analysis_settings.h"
+#include "algorithms/numbers/sample_summary.h"
+#include "algorithms/numbers/special_functions.h"
+#include "common/parameter_set.h"
+#include "evaluation/evaluator.h"
+
+namespace mirevo {
+
+/// N sets drawn from independent normal distributions, not held against the bounds. The stream starts anew from the
+/// seed, whose sign does not matter. A deviate that has no quantile is reported to `messages` and yields the mean.
+std::vector<ParameterSet> uncertaintySample(const UncertaintySettings& settings, std::int32_t seed,
+                                            const MessageSink& messages = {});
+
+/// The sets of an uncertainty analysis and their results, in the same order.
+struct UncertaintyOutcome {
+  std::vector<ParameterSet> sample;
+  std::vector<EvaluationResult> results;
+};
+
+/// Draws the sample and evaluates it in one batch (an empty one where there is no variable parameter). Aggregates are
+/// not settled from the sample: nothing here uses them, and a constant objective function must not end the analysis.
+UncertaintyOutcome uncertaintyAnalysis(const UncertaintySettings& settings, std::int32_t seed, Evaluator& evaluator,
+                                       const MessageSink& messages = {});
+
+/// Names of what an analysis reports, for its tables; each in setup order.
+struct AnalysisNames {
+  std::vector<std::string> parameters;
+  std::vector<std::string> measures;
+  std::vector<std::string> objectives;
+};
+
+struct UncertaintySummary {
+  std::size_t evaluationCount = 0;
+  std::size_t failedCount = 0;                    ///< left out of the statistics of measures and objective functions
+  std::vector<SampleSummary> parameters;          ///< of all sets drawn, search scale
+  std::vector<std::vector<double>> correlations;  ///< of the parameters of all sets drawn
+  std::vector<SampleSummary> measures;
+  std::vector<SampleSummary> objectives;
+};
+
+UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome);
+
+/// The summary as lines of text for the log.
+std::vector<std::string> formatUncertainty(const UncertaintySummary& summary, const AnalysisNames& names);
+
+}  // namespace mirevo

@@ -1,0 +1,157 @@
+#include "algorithms/searches/dds.h"
+
+#include <algorithm>
+#include <cmath>
+#include <utility>
+
+namespace mirevo {
+
+namespace {
+
+/// Share of the budget that goes to random start points; deliberately a 32-bit number, as it decides the rounding.
+constexpr float kStartPointShare = 0.005F;
+constexpr int kFewestStartPoints = 5;
+
+bool isUsable(const SearchBounds& bounds) {
+  if (bounds.lower.empty() || bounds.upper.size() != bounds.size()) return false;
+  for (std::size_t j = 0; j < bounds.size(); ++j) {
+    const double range = bounds.upper[j] - bounds.lower[j];
+    if (!std::isfinite(range) || range < 0.0) return false;
+  }
+  return true;
+}
+
+/// A NaN is worse than everything, so that neither a candidate without a value nor a start point without one can stay
+/// best.
+bool isLess(double a, double b) {
+  return !std::isnan(a) && (std::isnan(b) || a < b);
+}
+bool isNotGreater(double a, double b) {
+  return !std::isnan(a) && (std::isnan(b) || a <= b);
+}
+
+}  // namespace
+
+Dds::Dds(DdsSettings settings, int maxEvaluations, bool startFromInitial, SearchBounds bounds, Evaluator& evaluator,
+         UniformGenerator& random)
+    : settings_(settings),
+      maxEvaluations_(maxEvaluations),
+      startFromInitial_(startFromInitial),
+      bounds_(std::move(bounds)),
+      evaluator_(evaluator),
+      random_(random) {}
+
+SearchStatus Dds::initialise() {
+  if (maxEvaluations_ < 1 || !isUsable(bounds_)) return kDdsInvalidInput;
+  if (startFromInitial_ && bounds_.initial.size() != bounds_.size()) return kDdsInvalidInput;
+  summary_ = {};
+  const std::vector<ParameterSet> points = startPoints();
+  std::vector<EvaluationResult> results = evaluator_.evaluateParameterSets(points, DispatchMode::task);
+  evaluator_.settleAggregates(results);
+  summary_.evaluationCount = static_cast<int>(points.size());
+  std::size_t best = 0;
+  for (std::size_t k = 1; k < results.size(); ++k) {
+    if (isLess(results[k].aggregate, results[best].aggregate)) best = k;
+  }
+  takeAsBest(points[best], results[best]);
+  checkBudget();
+  return kSearchOk;
+}
+
+SearchStatus Dds::advance() {
+  if (isTerminated()) return kSearchOk;
+  if (summary_.evaluationCount == 0) return kDdsInvalidInput;
+  const double probability = ddsInclusionProbability(summary_.evaluationCount + 1, maxEvaluations_);
+  const ParameterSet candidate =
+      ddsCandidate(summary_.best, bounds_, settings_.perturbation, probability, [this] { return random_.next(); });
+  std::vector<EvaluationResult> results = evaluator_.evaluateParameterSets({&candidate, 1}, DispatchMode::task);
+  ++summary_.evaluationCount;
+  ++summary_.loopCount;
+  // An equal value replaces the best on purpose: it lets the search drift along a plateau.
+  if (isNotGreater(results.front().aggregate, summary_.bestResult.aggregate)) takeAsBest(candidate, results.front());
+  checkBudget();
+  return kSearchOk;
+}
+
+std::vector<ParameterSet> Dds::startPoints() {
+  if (startFromInitial_) return {bounds_.initial};
+  std::vector<ParameterSet> points(static_cast<std::size_t>(ddsStartPointCount(maxEvaluations_)));
+  for (ParameterSet& point : points) {
+    point.resize(bounds_.size());
+    for (std::size_t j = 0; j < point.size(); ++j) {
+      point[j] = bounds_.lower[j] + random_.next() * (bounds_.upper[j] - bounds_.lower[j]);
+    }
+  }
+  return points;
+}
+
+void Dds::takeAsBest(const ParameterSet& set, EvaluationResult& result) {
+  summary_.best = set;
+  summary_.bestResult = std::move(result);
+}
+
+void Dds::checkBudget() {
+  if (summary_.evaluationCount >= maxEvaluations_) {
+    summary_.terminationMessage = "Optimisation terminated: Maximum number of model evaluations reached";
+  }
+}
+
+int ddsStartPointCount(int maxEvaluations) {
+  const int share = static_cast<int>(std::lround(static_cast<double>(kStartPointShare) * maxEvaluations));
+  return std::min(std::max(kFewestStartPoints, share), maxEvaluations);
+}
+
+double ddsInclusionProbability(int evaluation, int maxEvaluations) {
+  if (maxEvaluations <= 1) return 0.0;
+  return 1.0 - std::log(static_cast<double>(evaluation)) / std::log(static_cast<double>(maxEvaluations));
+}
+
+double ddsNormalDeviate(const DeviateSource& deviate) {
+  double u1 = 0.0;
+  double u2 = 0.0;
+  double s = 0.0;
+  do {
+    const double first = deviate();
+    u1 = (first - 1.0) + first;
+    const double second = deviate();
+    u2 = (second - 1.0) + second;
+    s = u1 * u1 + u2 * u2;
+  } while (s >= 1.0 || s == 0.0);
+  const double f = std::sqrt(-2.0 * std::log(s) / s);
+  return 0.5 > deviate() ? f * u1 : f * u2;
+}
+
+double ddsReflect(double value, double lower, double upper) {
+  if (value < lower) {
+    const double reflected = 2.0 * lower - value;
+    return reflected > upper ? lower : reflected;
+  }
+  if (value > upper) {
+    const double reflected = 2.0 * upper - value;
+    return reflected < lower ? upper : reflected;
+  }
+  return value;
+}
+
+ParameterSet ddsCandidate(std::span<const double> best, const SearchBounds& bounds, double r,
+                          double inclusionProbability, const DeviateSource& deviate) {
+  const std::size_t n = best.size();
+  std::vector<std::size_t> chosen;
+  for (std::size_t j = 0; j < n; ++j) {
+    if (deviate() < inclusionProbability) chosen.push_back(j);
+  }
+  if (chosen.empty()) {
+    // Counted from 1, as ceil(U n); a deviate of 0 means the first parameter, too.
+    const double position = std::ceil(deviate() * static_cast<double>(n));
+    chosen.push_back(std::min(static_cast<std::size_t>(std::max(position, 1.0)), n) - 1);
+  }
+  ParameterSet candidate(best.begin(), best.end());
+  for (const std::size_t j : chosen) {
+    const double range = bounds.upper[j] - bounds.lower[j];
+    const double perturbed = best[j] + r * range * ddsNormalDeviate(deviate);
+    candidate[j] = ddsReflect(perturbed, bounds.lower[j], bounds.upper[j]);
+  }
+  return candidate;
+}
+
+}  // namespace mirevo

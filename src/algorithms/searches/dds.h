@@ -1,0 +1,71 @@
+#pragma once
+
+#include <functional>
+#include <span>
+
+#include "algorithms/numbers/uniform_generator.h"
+#include "algorithms/searches/search_algorithm.h"
+#include "algorithms/searches/search_settings.h"
+#include "evaluation/evaluator.h"
+
+namespace mirevo {
+
+/// Dynamically Dimensioned Search after Tolson and Shoemaker (2007), doi:10.1029/2005WR004723. One candidate at a time:
+/// the best set with some parameters perturbed, ever fewer of them as the budget is used up.
+///
+/// Differs from the paper in that the start points count as evaluations in the inclusion probability, that a point
+/// reflected past the opposite bound lands on the bound that it violated first, and that each normal deviate throws
+/// its twin of the polar method away.
+class Dds final : public SearchAlgorithm {
+ public:
+  /// `maxEvaluations` (m) is the whole budget, start points included. The evaluator and the stream must outlive this.
+  Dds(DdsSettings settings, int maxEvaluations, bool startFromInitial, SearchBounds bounds, Evaluator& evaluator,
+      UniformGenerator& random);
+
+  /// Evaluates the start points in one batch: the initial set, or ddsStartPointCount(m) random ones. Returns
+  /// kDdsInvalidInput, without an evaluation, for a budget below 1 and for bounds that are missing, crossed or not
+  /// finite.
+  SearchStatus initialise() override;
+  /// Makes and evaluates one candidate. Does nothing once terminated; kDdsInvalidInput before initialise().
+  SearchStatus advance() override;
+  bool isTerminated() const override { return !summary_.terminationMessage.empty(); }
+  const SearchSummary& summary() const override { return summary_; }
+
+ private:
+  std::vector<ParameterSet> startPoints();
+  void takeAsBest(const ParameterSet& set, EvaluationResult& result);
+  void checkBudget();
+
+  DdsSettings settings_;
+  int maxEvaluations_;
+  bool startFromInitial_;
+  SearchBounds bounds_;
+  Evaluator& evaluator_;
+  UniformGenerator& random_;
+  SearchSummary summary_;
+};
+
+inline constexpr SearchStatus kDdsInvalidInput = 1;
+
+/// Uniform deviates in [0, 1), one a call.
+using DeviateSource = std::function<double()>;
+
+/// Number of random start points for a budget of m >= 1 evaluations: max(5, 0.005 m), never more than m.
+int ddsStartPointCount(int maxEvaluations);
+
+/// P = 1 - ln(i) / ln(m), the probability with which evaluation i of m (both from 1, start points included) perturbs a
+/// parameter; 0 for m = 1.
+double ddsInclusionProbability(int evaluation, int maxEvaluations);
+
+/// A standard normal deviate by the polar method, in which one more deviate chooses between the two it yields.
+double ddsNormalDeviate(const DeviateSource& deviate);
+
+/// `value`, reflected at the bound that it violates; at that bound itself if the reflection violates the other one.
+double ddsReflect(double value, double lower, double upper);
+
+/// The best set with each parameter perturbed with the given probability, at least one of them; r is the
+/// perturbation's standard deviation as a fraction of the parameter's range.
+ParameterSet ddsCandidate(std::span<const double> best, const SearchBounds& bounds, double r,
+                          double inclusionProbability, const DeviateSource& deviate);
+
+}  // namespace mirevo

@@ -1,0 +1,220 @@
+#include "algorithms/searches/initial_sample.h"
+
+#include <algorithm>
+#include <cmath>
+#include <optional>
+
+#include <fmt/format.h>
+
+#include "algorithms/numbers/latin_hypercube.h"
+#include "algorithms/numbers/sobol.h"
+#include "common/fatal_error.h"
+#include "common/files.h"
+#include "common/text.h"
+
+namespace mirevo {
+namespace {
+
+constexpr int kMaximinTries = 50;
+constexpr std::string_view kInvalidFile = "Error: Initial sample file invalid";
+
+UnitPoints uniformPoints(std::size_t count, std::size_t dimension, UniformGenerator& random) {
+  UnitPoints points(count, std::vector<double>(dimension));
+  for (auto& point : points) {
+    for (double& coordinate : point) coordinate = random.next();
+  }
+  return points;
+}
+
+UnitPoints drawUnitPoints(SampleGeneration generation, std::size_t count, std::size_t dimension,
+                          UniformGenerator& random) {
+  switch (generation) {
+    case SampleGeneration::uniformRandom:
+      return uniformPoints(count, dimension, random);
+    case SampleGeneration::latinHypercube:
+      return latinHypercube(count, dimension, random);
+    case SampleGeneration::scrambledSobol:
+      if (dimension > kMaxSobolDimension) break;
+      return scrambledSobol(count, dimension, random);
+    case SampleGeneration::maximinLatinHypercube:
+      return maximinLatinHypercube(count, dimension, kMaximinTries, random);
+    case SampleGeneration::fromFile:
+      break;
+  }
+  fatalError(
+      "Error: Initial sample generation method invalid",
+      fmt::format("method {} cannot draw a sample of {} variable parameters", static_cast<int>(generation), dimension));
+}
+
+ParameterSet withinBounds(const std::vector<double>& unitPoint, const SearchBounds& bounds) {
+  ParameterSet set(bounds.size());
+  for (std::size_t j = 0; j < set.size(); ++j) {
+    const double value = bounds.lower[j] + unitPoint[j] * (bounds.upper[j] - bounds.lower[j]);
+    set[j] = std::clamp(value, bounds.lower[j], bounds.upper[j]);
+  }
+  return set;
+}
+
+/// Splits rows into cells by the separator that the header row shows.
+class RowSplitter {
+ public:
+  explicit RowSplitter(std::string_view header) {
+    for (const char candidate : {'\t', ';', ','}) {
+      if (header.find(candidate) != std::string_view::npos) {
+        separator_ = candidate;
+        break;
+      }
+    }
+  }
+
+  std::vector<std::string_view> operator()(std::string_view row) const {
+    std::vector<std::string_view> cells;
+    std::size_t begin = 0;
+    while (begin <= row.size()) {
+      const std::size_t end =
+          std::min(row.size(), separator_ == ' ' ? row.find_first_of(" \t", begin) : row.find(separator_, begin));
+      const std::string_view cell = trim(row.substr(begin, end - begin));
+      if (separator_ != ' ' || !cell.empty()) cells.push_back(cell);
+      begin = end + 1;
+    }
+    return cells;
+  }
+
+ private:
+  char separator_ = ' ';
+};
+
+/// The column of every parameter: entry c of the result is the parameter of column c.
+std::vector<std::size_t> parametersOfColumns(const std::vector<std::string_view>& header, const std::string& place,
+                                             const SearchSpace& space) {
+  std::vector<std::size_t> parameters;
+  for (const std::string_view name : header) {
+    const auto found = std::find(space.names.begin(), space.names.end(), name);
+    if (found == space.names.end()) {
+      const std::optional<std::string> near = nearestName(name, space.names);
+      fatalError(kInvalidFile, fmt::format("{}: \"{}\" is not the name of a variable parameter{}", place, name,
+                                           near ? fmt::format("; did you mean \"{}\"?", *near) : ""));
+    }
+    const auto parameter = static_cast<std::size_t>(found - space.names.begin());
+    if (std::find(parameters.begin(), parameters.end(), parameter) != parameters.end()) {
+      fatalError(kInvalidFile, fmt::format("{}: parameter \"{}\" has a second column", place, name));
+    }
+    parameters.push_back(parameter);
+  }
+  for (std::size_t j = 0; j < space.size(); ++j) {
+    if (std::find(parameters.begin(), parameters.end(), j) == parameters.end()) {
+      fatalError(kInvalidFile, fmt::format("{}: no column for parameter \"{}\"", place, space.names[j]));
+    }
+  }
+  return parameters;
+}
+
+/// A model-scale value of parameter j on the search scale, or nothing when it lies outside the bounds. A value that
+/// rounding carried past a bound, as in a table printed by another program, is put on the bound.
+std::optional<double> toSearchScale(double value, std::size_t j, const SearchSpace& space) {
+  const bool isInteger = space.transformation[j] == TransformationType::integer;
+  const double lower = space.lower[j];
+  const double upper = isInteger ? space.upper[j] - 1.0 : space.upper[j];
+  bool failed = false;
+  const double transformed =
+      TransformParameterValue(value, lower, space.transformation[j], TransformDirection::forward, failed);
+  // The integer rule truncates towards zero, so that a value just below the lower bound would pass for the bound.
+  const double compared = isInteger ? value : transformed;
+  const double tolerance = 1.0e-12 * std::max({1.0, std::abs(lower), std::abs(upper)});
+  if (failed || !(compared >= lower - tolerance)) return std::nullopt;
+  if (!(transformed <= upper + tolerance)) return std::nullopt;
+  return std::clamp(transformed, lower, upper);
+}
+
+ParameterSet readRow(const std::vector<std::string_view>& cells, const std::vector<std::size_t>& parameters,
+                     const std::string& place, const SearchSpace& space) {
+  if (cells.size() != parameters.size()) {
+    fatalError(kInvalidFile, fmt::format("{}: found {} values, expected {}, one for each name in the header", place,
+                                         cells.size(), parameters.size()));
+  }
+  ParameterSet set(space.size());
+  for (std::size_t column = 0; column < cells.size(); ++column) {
+    const std::size_t j = parameters[column];
+    const std::optional<double> value = parseReal(cells[column]);
+    if (!value) {
+      fatalError(kInvalidFile, fmt::format("{}: found \"{}\", expected a number for parameter \"{}\"", place,
+                                           cells[column], space.names[j]));
+    }
+    const std::optional<double> transformed = toSearchScale(*value, j, space);
+    if (!transformed) {
+      fatalError(kInvalidFile, fmt::format("{}: value {} of parameter \"{}\" lies outside its bounds", place,
+                                           cells[column], space.names[j]));
+    }
+    set[j] = *transformed;
+  }
+  return set;
+}
+
+}  // namespace
+
+SearchBounds searchBounds(const SearchSpace& space) {
+  // Ten times the tolerance by which the integer rule lifts a value onto the next integer.
+  constexpr double kBelowNextInteger = 1.0e-7;
+  SearchBounds bounds{space.lower, space.upper, space.initial, std::vector<bool>(space.size())};
+  for (std::size_t j = 0; j < space.size(); ++j) {
+    bounds.isInteger[j] = space.transformation[j] == TransformationType::integer;
+    if (bounds.isInteger[j]) bounds.upper[j] -= kBelowNextInteger;
+  }
+  return bounds;
+}
+
+std::vector<ParameterSet> drawInitialSample(const InitialSampleSettings& settings,
+                                            std::span<const ParameterSet> givenSets, const SearchBounds& bounds,
+                                            std::size_t count, UniformGenerator& random) {
+  std::vector<ParameterSet> sample;
+  sample.reserve(count);
+  if (settings.includeInitialParameters && count > 0) sample.push_back(bounds.initial);
+  const std::size_t drawn = count - sample.size();
+  const auto generation = static_cast<SampleGeneration>(settings.generation);
+  if (generation == SampleGeneration::fromFile) {
+    if (givenSets.size() < drawn) {
+      fatalError(kInvalidFile,
+                 fmt::format("{}: found {} sets, expected at least {}", settings.fileName, givenSets.size(), drawn));
+    }
+    sample.insert(sample.end(), givenSets.begin(), givenSets.begin() + static_cast<std::ptrdiff_t>(drawn));
+    return sample;
+  }
+  for (const auto& point : drawUnitPoints(generation, drawn, bounds.size(), random)) {
+    sample.push_back(withinBounds(point, bounds));
+  }
+  return sample;
+}
+
+std::vector<ParameterSet> readInitialSample(std::string_view fileName, std::string_view text,
+                                            const SearchSpace& space) {
+  std::vector<ParameterSet> sets;
+  std::optional<RowSplitter> splitter;
+  std::vector<std::size_t> parameters;
+  int lineNumber = 0;
+  for (std::string_view line : splitLines(text)) {
+    ++lineNumber;
+    line = trim(line);
+    if (line.empty() || line.front() == '#') continue;
+    const std::string place = fmt::format("{}:{}", fileName, lineNumber);
+    if (!splitter) {
+      splitter.emplace(line);
+      parameters = parametersOfColumns((*splitter)(line), place, space);
+    } else {
+      sets.push_back(readRow((*splitter)(line), parameters, place, space));
+    }
+  }
+  if (sets.empty()) {
+    fatalError(kInvalidFile, fmt::format("{}: expected a header of parameter names and one set a row, found {}",
+                                         fileName, splitter ? "a header alone" : "nothing"));
+  }
+  return sets;
+}
+
+std::vector<ParameterSet> loadInitialSample(const std::string& fileName, const SearchSpace& space) {
+  std::string reason;
+  const std::optional<std::string> text = readTextFile(fileName, reason);
+  if (!text) fatalError(kInvalidFile, fmt::format("{}: {}", fileName, reason));
+  return readInitialSample(fileName, *text, space);
+}
+
+}  // namespace mirevo

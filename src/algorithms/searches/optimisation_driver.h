@@ -1,0 +1,41 @@
+#pragma once
+
+#include <functional>
+#include <limits>
+#include <string>
+#include <string_view>
+
+#include "algorithms/searches/population_search.h"
+#include "algorithms/searches/search_algorithm.h"
+#include "algorithms/searches/search_settings.h"
+#include "algorithms/surrogate/proposal_selector.h"
+
+namespace mirevo {
+
+/// Receives a line for the log and the progress report, every tenth loop and once more when the search ends.
+using PeriodicStep = std::function<void(std::string_view line)>;
+
+/// Drives a search from its initial sample to its end and returns what it found. `algorithm` ("SCE", "PSE" or "DDS")
+/// stands in the message of the FatalError that a step with a status other than 0 throws, "Error: Invalid operation in
+/// SCE algorithm". Throws FatalError "Error: Unable to allocate memory", too, and what the evaluator throws.
+/// With `evaluationLimit` it ends as soon as so many evaluations are made, though the search itself would go on.
+SearchSummary runSearch(SearchAlgorithm& search, std::string_view algorithm, const PeriodicStep& periodicStep,
+                        int evaluationLimit = std::numeric_limits<int>::max());
+
+enum class PopulationAlgorithm { sce, pse };
+
+struct PopulationSearchSettings {
+  PopulationAlgorithm algorithm = PopulationAlgorithm::sce;
+  bool usesSurrogate = false;
+  SceSettings sce;
+  PseSettings pse;
+  SimplexSettings simplex;
+  SurrogateSettings surrogate;  ///< with usesSurrogate
+};
+
+/// Runs SCE or PSE, with or without the help of the surrogate model, from its initial sample to its end. Throws what
+/// runSearch() throws. The `selector` of `problem` is set here.
+SearchSummary runPopulationSearch(const PopulationSearchSettings& settings, SearchProblem problem,
+                                  const PeriodicStep& periodicStep);
+
+}  // namespace mirevo

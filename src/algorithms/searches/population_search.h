@@ -1,0 +1,92 @@
+#pragma once
+
+#include <cstddef>
+#include <optional>
+#include <span>
+#include <vector>
+
+#include "algorithms/numbers/uniform_generator.h"
+#include "algorithms/searches/population.h"
+#include "algorithms/searches/search_algorithm.h"
+#include "algorithms/searches/search_settings.h"
+#include "algorithms/searches/stopping_criteria.h"
+#include "evaluation/evaluator.h"
+
+namespace mirevo {
+
+class ProposalSelector;
+struct PredictedMinimum;
+
+/// What a population search works on. The references must outlive the search.
+struct SearchProblem {
+  SearchBounds bounds;
+  StoppingCriteria stopping;
+  InitialSampleSettings initialSample;
+  std::vector<ParameterSet> givenSample;  ///< search scale; the sets of the initial sample file, for generation 4
+  Evaluator& evaluator;
+  UniformGenerator& random;
+  ProposalSelector* selector = nullptr;  ///< of a surrogate-assisted search
+};
+
+/// Statuses of a search step.
+inline constexpr SearchStatus kSearchSettingsInvalid = 1;
+inline constexpr SearchStatus kSearchNotInitialised = 2;
+
+/// What SCE and PSE have in common: the initial sample, the batches within the evaluation budget, the stopping tests
+/// and the summary. The budget is never exceeded: a batch is cut to what is left of it, in the order of its proposals.
+class PopulationSearch : public SearchAlgorithm {
+ public:
+  SearchStatus initialise() final;
+  SearchStatus advance() final;
+  bool isTerminated() const final { return stopping_.isMet(); }
+  const SearchSummary& summary() const final { return summary_; }
+
+  /// Best first.
+  const Population& population() const { return population_; }
+
+ protected:
+  explicit PopulationSearch(SearchProblem problem);
+
+  virtual bool areSettingsValid() const = 0;
+  virtual std::size_t populationSize() const = 0;
+  /// Makes one loop over `population_`, which is sorted best first before it and need not be after it.
+  virtual void makeLoop() = 0;
+
+  /// Evaluates proposals in one batch. The results stand in the order of the proposals; nothing stands where a proposal
+  /// was not run as the budget is used up.
+  std::vector<std::optional<EvaluationResult>> evaluate(std::span<const ParameterSet> proposals);
+  /// How many proposals the search should make for each one that it has evaluated: more than one where a surrogate
+  /// model chooses among them.
+  std::size_t proposalsPerRun() const;
+  /// Places of the `count` most promising proposals, in ascending order.
+  std::vector<std::size_t> mostPromising(std::span<const ParameterSet> proposals, std::size_t count);
+  /// Where the surrogate model fitted around each of `centres` predicts least; nothing where it is not in use, or where
+  /// that has been run already.
+  std::vector<PredictedMinimum> predictedMinima(std::span<const Individual> centres);
+  bool isBudgetUsedUp() const { return summary_.evaluationCount >= problem_.stopping.maxEvaluations; }
+
+  const SearchBounds& bounds() const { return problem_.bounds; }
+  double draw() { return problem_.random.next(); }
+  bool isWithinBounds(const ParameterSet& set) const;
+  /// Puts a point that rounding may have carried past a bound back on it.
+  ParameterSet clampedToBounds(ParameterSet set) const;
+  /// A uniformly random point of a box.
+  ParameterSet drawFrom(const Box& box);
+  /// Places of `count` distinct members out of the best `size` of m = `ranked` that are sorted best first, drawn one
+  /// after the other, the i-th best with a probability proportional to m + 1 − i; returned in ascending order.
+  std::vector<std::size_t> drawSimplex(std::size_t count, std::size_t size, std::size_t ranked);
+
+  Population population_;
+
+ private:
+  bool isProblemValid() const;
+  std::vector<EvaluationResult> run(std::span<const ParameterSet> sets, DispatchMode mode);
+  bool isSelecting() const;
+  void noteLoop();
+
+  SearchProblem problem_;
+  StoppingTests stopping_;
+  SearchSummary summary_;
+};
+
+}  // namespace mirevo

@@ -1,0 +1,157 @@
+#include "algorithms/searches/pse.h"
+
+#include <algorithm>
+#include <cmath>
+#include <utility>
+
+#include "algorithms/numbers/special_functions.h"
+#include "algorithms/surrogate/proposal_selector.h"
+
+namespace mirevo {
+namespace {
+
+/// Standard deviation of a mutation, in those of the simplex. With 1 the test functions take up to a tenth more
+/// evaluations; with 0.8 small populations collapse.
+constexpr double kMutationSpread = 0.9;
+
+/// Length of a reflection in those of SCE, whose complexes keep points apart that this population draws together. With
+/// 1 it comes to rest in curved valleys; with 1.2 it loses valleys in ten dimensions.
+constexpr double kReflectionLength = 1.1;
+
+/// With a surrogate model: of a generation one run in so many goes to its predicted minima.
+constexpr std::size_t kPointsPerMinimum = 4;
+
+constexpr int kReflectionFailed = 1;
+constexpr int kContractionFailed = 2;
+
+}  // namespace
+
+Pse::Pse(const PseSettings& settings, const SimplexSettings& simplex, SearchProblem problem)
+    : PopulationSearch(std::move(problem)), settings_(settings), simplex_(simplex) {}
+
+bool Pse::areSettingsValid() const {
+  const double r = settings_.reflectionProbability;
+  const double c = settings_.contractionProbability;
+  return settings_.populationSize >= 1 && simplex_.pointCount >= 2 && simplex_.pointCount <= settings_.populationSize &&
+         r >= 0.0 && c >= 0.0 && r + c <= 1.0;
+}
+
+void Pse::makeLoop() {
+  std::vector<Offspring> offspring;
+  for (const std::size_t parent : chooseParents()) offspring.push_back(mostPromisingOffspring(parent));
+  proposePredictedMinima(offspring);
+  std::vector<ParameterSet> proposals;
+  proposals.reserve(offspring.size());
+  for (const Offspring& child : offspring) proposals.push_back(child.set);
+  replaceParents(offspring, proposals);
+}
+
+/// With a surrogate model, runs where it predicts least around each of the best points take the turns of offspring
+/// spread evenly over the generation: were they those of the worst points, these would hardly ever move. They replace
+/// the points around which they were predicted when better, so that the population stays spread.
+void Pse::proposePredictedMinima(std::vector<Offspring>& offspring) {
+  const std::size_t most = std::max(population_.size() / kPointsPerMinimum, std::size_t{1});
+  std::vector<PredictedMinimum> minima = predictedMinima(std::span(population_).first(most));
+  for (std::size_t k = 0; k < minima.size(); ++k) {
+    offspring[k * offspring.size() / minima.size()] = {std::move(minima[k].set), minima[k].centre};
+  }
+}
+
+/// The parents of a generation, best first: what a budget cuts off are the offspring of the worst. The best points have
+/// too few better ones for a simplex that is worse than them alone, and their turns go to the worst.
+std::vector<std::size_t> Pse::chooseParents() const {
+  const std::size_t size = population_.size();
+  // Less than half, so that the best of the parents, whose simplex has no choice, has a single offspring.
+  const std::size_t unmoved = std::min(static_cast<std::size_t>(simplex_.pointCount) - 1, (size - 1) / 2);
+  std::vector<std::size_t> parents;
+  parents.reserve(size);
+  for (std::size_t place = unmoved; place < size; ++place) {
+    parents.insert(parents.end(), place < size - unmoved ? 1 : 2, place);
+  }
+  return parents;
+}
+
+/// A point's own offspring compete, not those of the whole population: the promising ones of all lie close together.
+Pse::Offspring Pse::mostPromisingOffspring(std::size_t parent) {
+  std::vector<Offspring> drawn;
+  std::vector<ParameterSet> proposals;
+  for (std::size_t i = 0; i < proposalsPerRun(); ++i) {
+    drawn.push_back(makeOffspring(parent));
+    proposals.push_back(drawn.back().set);
+  }
+  return std::move(drawn[mostPromising(proposals, 1).front()]);
+}
+
+void Pse::replaceParents(std::span<const Offspring> offspring, std::span<const ParameterSet> proposals) {
+  std::vector<std::optional<EvaluationResult>> results = evaluate(proposals);
+  std::vector<bool> isReplaced(population_.size(), false);
+  for (std::size_t i = 0; i < proposals.size(); ++i) {
+    if (!results[i]) continue;
+    const Offspring& child = offspring[i];
+    Individual& parent = population_[child.parent];
+    // Neither the best point nor one that this generation has just found gives way to a worse one.
+    const bool isTakenAnyway =
+        child.isTakenAnyway && child.parent > 0 && !isReplaced[child.parent] && isUsable(*results[i]);
+    if (isTakenAnyway || isBetter(results[i]->aggregate, parent.value())) {
+      parent = {proposals[i], std::move(*results[i])};
+      isReplaced[child.parent] = true;
+    } else if (!isReplaced[child.parent]) {
+      parent.failedMoves = std::max(parent.failedMoves, child.failedMoves);
+    }
+  }
+}
+
+/// The other points of the simplex: better ones than the parent; any where a small population has too few.
+std::vector<std::size_t> Pse::drawOthers(std::size_t parent) {
+  const auto count = static_cast<std::size_t>(simplex_.pointCount) - 1;
+  const std::size_t size = population_.size();
+  if (parent >= count) return drawSimplex(count, parent, size);
+  std::vector<std::size_t> places = drawSimplex(count, size - 1, size);
+  for (std::size_t& place : places) place += place >= parent ? 1 : 0;
+  return places;
+}
+
+Pse::Offspring Pse::makeOffspring(std::size_t parent) {
+  const double move = draw();
+  const std::vector<std::size_t> others = drawOthers(parent);
+  const std::vector<double> g = centroid(population_, others);
+  const Individual& u = population_[parent];
+  if (u.failedMoves == kContractionFailed) return {mutation(parent, others, g), parent, kContractionFailed, true};
+  if (move >= settings_.reflectionProbability + settings_.contractionProbability) {
+    return {mutation(parent, others, g), parent};
+  }
+  if (move >= settings_.reflectionProbability || u.failedMoves == kReflectionFailed) {
+    const ParameterSet point = pointOnRay(g, u.set, contractionFactor(bounds().size()));
+    return {clampedToBounds(point), parent, kContractionFailed};
+  }
+  return {reflection(parent, others, g), parent, kReflectionFailed};
+}
+
+ParameterSet Pse::reflection(std::size_t parent, std::span<const std::size_t> others, std::span<const double> g) {
+  ParameterSet point = pointOnRay(g, population_[parent].set, -kReflectionLength * reflectionFactor(bounds().size()));
+  return isWithinBounds(point) ? point : mutation(parent, others, g);
+}
+
+/// Normally distributed about g in every parameter, with a standard deviation after that of the simplex about g. What
+/// would leave the bounds is drawn evenly from the range of the simplex.
+ParameterSet Pse::mutation(std::size_t parent, std::span<const std::size_t> others, std::span<const double> g) {
+  std::vector<std::size_t> simplex(others.begin(), others.end());
+  simplex.push_back(parent);
+  const Box box = boundingBox(population_, simplex);
+  ParameterSet point(g.begin(), g.end());
+  for (std::size_t j = 0; j < point.size(); ++j) {
+    double squares = 0.0;
+    for (const std::size_t place : simplex) {
+      const double distance = population_[place].set[j] - g[j];
+      squares += distance * distance;
+    }
+    int fault = 0;
+    const double deviate = normalQuantile(draw(), fault);
+    point[j] += kMutationSpread * std::sqrt(squares / static_cast<double>(simplex.size())) * deviate;
+    const bool isOutside = !(point[j] >= bounds().lower[j] && point[j] <= bounds().upper[j]);
+    if (isOutside) point[j] = box.lower[j] + draw() * (box.upper[j] - box.lower[j]);
+  }
+  return clampedToBounds(std::move(point));
+}
+
+}  // namespace mirevo

@@ -1,0 +1,57 @@
+#pragma once
+
+#include <cstddef>
+#include <span>
+#include <vector>
+
+#include "algorithms/searches/population_search.h"
+
+namespace mirevo {
+
+/// Population Simplex Evolution: the step of SCE made by all points of one population at once, a whole generation in
+/// one batch.
+///
+/// A loop, one generation, makes as many offspring as the population has points. The best q − 1 points stay as they
+/// are; every other point u has an offspring, and the q − 1 worst have two. For each, q − 1 distinct points better than
+/// u are drawn, the i-th best of the population's N with a probability proportional to N + 1 − i, as SCE draws those of
+/// a simplex of which u is the worst. Let g be their centroid. The step of a point, spread over generations, is
+///   the reflection g − a·(u − g);
+///   when it has failed the contraction g + c·(u − g);
+///   when both have failed a mutation, taken even when worse: u has got stuck.
+/// A mutation that is due is made; else the move that is due with `reflectionProbability`, a contraction at once with
+/// `contractionProbability`, and a mutation at once with what is left to 1. It takes the place of u when better. A new
+/// point begins a step. A mutation is normally distributed about g, in every parameter on its own: that brings back the
+/// directions that the linear moves lose. It also stands in for a reflection outside the bounds. a and c are those of
+/// SCE. With a surrogate model the most promising of several offspring of a point is run; a quarter of the generation
+/// is run where the model predicts least around each of the best points. What the alternatives cost is measured in
+/// docs/algorithms/pse.md and docs/algorithms/surrogate.md.
+class Pse final : public PopulationSearch {
+ public:
+  Pse(const PseSettings& settings, const SimplexSettings& simplex, SearchProblem problem);
+
+ private:
+  struct Offspring {
+    ParameterSet set;
+    std::size_t parent = 0;      ///< place of u in the population
+    int failedMoves = 0;         ///< of the parent's step once this offspring has failed
+    bool isTakenAnyway = false;  ///< even when worse than u
+  };
+
+  bool areSettingsValid() const override;
+  std::size_t populationSize() const override { return static_cast<std::size_t>(settings_.populationSize); }
+  void makeLoop() override;
+
+  std::vector<std::size_t> chooseParents() const;
+  std::vector<std::size_t> drawOthers(std::size_t parent);
+  Offspring makeOffspring(std::size_t parent);
+  Offspring mostPromisingOffspring(std::size_t parent);
+  ParameterSet reflection(std::size_t parent, std::span<const std::size_t> others, std::span<const double> g);
+  ParameterSet mutation(std::size_t parent, std::span<const std::size_t> others, std::span<const double> g);
+  void proposePredictedMinima(std::vector<Offspring>& offspring);
+  void replaceParents(std::span<const Offspring> offspring, std::span<const ParameterSet> proposals);
+
+  PseSettings settings_;
+  SimplexSettings simplex_;
+};
+
+}  // namespace mirevo

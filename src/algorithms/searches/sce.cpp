@@ -1,0 +1,135 @@
+#include "algorithms/searches/sce.h"
+
+#include <algorithm>
+#include <utility>
+
+#include "algorithms/surrogate/proposal_selector.h"
+
+namespace mirevo {
+
+Sce::Sce(const SceSettings& settings, const SimplexSettings& simplex, SearchProblem problem)
+    : PopulationSearch(std::move(problem)), settings_(settings), simplex_(simplex) {}
+
+bool Sce::areSettingsValid() const {
+  return settings_.complexCount >= 1 && settings_.pointsPerComplex >= 2 && settings_.evolutionSteps >= 1 &&
+         simplex_.pointCount >= 2 && simplex_.pointCount <= settings_.pointsPerComplex;
+}
+
+std::size_t Sce::populationSize() const {
+  return static_cast<std::size_t>(settings_.complexCount) * static_cast<std::size_t>(settings_.pointsPerComplex);
+}
+
+void Sce::makeLoop() {
+  dealIntoComplexes();
+  for (int step = 0; step < settings_.evolutionSteps && !isBudgetUsedUp(); ++step) {
+    for (Complex& complex : complexes_) chooseSubcomplex(complex);
+    proposePredictedMinimum(complexes_.front());
+    makeEvolutionStep();
+  }
+  shuffle();
+}
+
+void Sce::dealIntoComplexes() {
+  const auto p = static_cast<std::size_t>(settings_.complexCount);
+  complexes_.assign(p, Complex{});
+  for (std::size_t rank = 0; rank < population_.size(); ++rank) {
+    complexes_[rank % p].points.push_back(std::move(population_[rank]));
+  }
+  population_.clear();
+}
+
+void Sce::shuffle() {
+  for (Complex& complex : complexes_) {
+    std::move(complex.points.begin(), complex.points.end(), std::back_inserter(population_));
+  }
+  complexes_.clear();
+}
+
+void Sce::makeEvolutionStep() {
+  tryProposals(&Sce::firstProposal, Acceptance::whenBetter);
+  tryProposals(&Sce::secondProposal, Acceptance::whenBetter);
+  tryProposals(&Sce::mutation, Acceptance::always);
+  for (Complex& complex : complexes_) sortBestFirst(complex.points);
+}
+
+Sce::Subcomplex Sce::drawSubcomplex(const Complex& complex) {
+  const std::vector<std::size_t> places =
+      drawSimplex(static_cast<std::size_t>(simplex_.pointCount), complex.points.size(), complex.points.size());
+  return {places.back(), centroid(complex.points, std::span(places).first(places.size() - 1))};
+}
+
+/// Draws the subcomplex of a step. A surrogate model chooses the most promising of the reflections and contractions of
+/// several subcomplexes; it comes first, and its counterpart second.
+void Sce::chooseSubcomplex(Complex& complex) {
+  const std::size_t count = proposalsPerRun();
+  std::vector<Subcomplex> drawn;
+  std::vector<ParameterSet> proposals;
+  while (proposals.size() < count) {
+    complex.current = drawSubcomplex(complex);
+    drawn.push_back(complex.current);
+    proposals.push_back(reflection(complex));
+    if (proposals.size() < count) proposals.push_back(contraction(complex));
+  }
+  const std::size_t chosen = mostPromising(proposals, 1).front();
+  complex.isMoved = false;
+  complex.isFirstPredicted = false;
+  complex.current = std::move(drawn[chosen / 2]);
+  complex.first = std::move(proposals[chosen]);
+  complex.second = chosen % 2 == 0 ? contraction(complex) : std::move(proposals[chosen - 1]);
+}
+
+/// With a surrogate model the complex that holds the best point tries first where the model predicts least, and what it
+/// would have tried first comes second. A minimum better than the best point takes that one's place: it says much about
+/// the valley, and nothing about the rest of the complex, which a worst point less would draw together.
+void Sce::proposePredictedMinimum(Complex& complex) {
+  std::vector<PredictedMinimum> minima = predictedMinima(std::span(complex.points).first(1));
+  if (minima.empty()) return;
+  complex.second = std::exchange(complex.first, std::move(minima.front().set));
+  complex.isFirstPredicted = true;
+}
+
+/// Evaluates one proposal of every complex that has not moved yet, in one batch.
+void Sce::tryProposals(Proposal propose, Acceptance acceptance) {
+  std::vector<Complex*> proposers;
+  std::vector<ParameterSet> proposals;
+  for (Complex& complex : complexes_) {
+    if (complex.isMoved) continue;
+    proposers.push_back(&complex);
+    proposals.push_back((this->*propose)(complex));
+  }
+  std::vector<std::optional<EvaluationResult>> results = evaluate(proposals);
+  for (std::size_t i = 0; i < proposers.size(); ++i) {
+    if (!results[i]) continue;
+    Complex& complex = *proposers[i];
+    Individual& best = complex.points.front();
+    Individual& worst = complex.points[complex.current.worst];
+    const bool isTakenAnyway = acceptance == Acceptance::always && isUsable(*results[i]);
+    if (!isTakenAnyway && !isBetter(results[i]->aggregate, worst.value())) continue;
+    const bool isRefined =
+        propose == &Sce::firstProposal && complex.isFirstPredicted && isBetter(results[i]->aggregate, best.value());
+    (isRefined ? best : worst) = {std::move(proposals[i]), std::move(*results[i])};
+    complex.isMoved = true;
+  }
+}
+
+ParameterSet Sce::reflection(const Complex& complex) {
+  const Subcomplex& current = complex.current;
+  ParameterSet point =
+      pointOnRay(current.centroid, complex.points[current.worst].set, -reflectionFactor(bounds().size()));
+  return isWithinBounds(point) ? point : drawFrom(boundingBox(complex.points));
+}
+
+ParameterSet Sce::contraction(const Complex& complex) {
+  const Subcomplex& current = complex.current;
+  return clampedToBounds(
+      pointOnRay(current.centroid, complex.points[current.worst].set, contractionFactor(bounds().size())));
+}
+
+ParameterSet Sce::mutation(const Complex& complex) {
+  const Box box = boundingBox(complex.points);
+  std::vector<ParameterSet> drawn;
+  for (std::size_t i = 0; i < proposalsPerRun(); ++i) drawn.push_back(drawFrom(box));
+  return drawn[mostPromising(drawn, 1).front()];
+}
+
+}  // namespace mirevo

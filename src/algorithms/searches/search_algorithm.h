@@ -1,0 +1,44 @@
+#pragma once
+
+#include <cstdint>
+#include <string>
+#include <vector>
+
+#include "algorithms/numbers/search_bounds.h"
+#include "common/parameter_set.h"
+#include "evaluation/evaluation_result.h"
+
+namespace mirevo {
+
+/// 0 is success; anything else ends the run.
+using SearchStatus = std::int32_t;
+inline constexpr SearchStatus kSearchOk = 0;
+
+/// What a search has found so far and why it stopped.
+struct SearchSummary {
+  ParameterSet best;  ///< search scale; empty before the initial sample
+  EvaluationResult bestResult;
+  int evaluationCount = 0;  ///< model evaluations made, failed ones included
+  int loopCount = 0;
+  double populationSpread = 0.0;   ///< search scale; populationSpread() of a search with a population
+  double populationRange = 0.0;    ///< normalisedPopulationRange() of a search with a population
+  std::string terminationMessage;  ///< empty while it runs
+};
+
+/// A search in steps: the step modes -1 (initialise) and 0 (advance) of its caller.
+class SearchAlgorithm {
+ public:
+  SearchAlgorithm() = default;
+  SearchAlgorithm(const SearchAlgorithm&) = delete;
+  SearchAlgorithm& operator=(const SearchAlgorithm&) = delete;
+  virtual ~SearchAlgorithm() = default;
+
+  /// Draws and evaluates the initial sample.
+  virtual SearchStatus initialise() = 0;
+  /// Makes one loop.
+  virtual SearchStatus advance() = 0;
+  virtual bool isTerminated() const = 0;
+  virtual const SearchSummary& summary() const = 0;
+};
+
+}  // namespace mirevo

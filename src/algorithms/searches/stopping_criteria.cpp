@@ -1,0 +1,33 @@
+#include "algorithms/searches/stopping_criteria.h"
+
+#include <algorithm>
+#include <cmath>
+
+namespace mirevo {
+
+StoppingTests::StoppingTests(const StoppingCriteria& criteria)
+    : criteria_(criteria), relativeChange_(criteria.minChange + criteria.minChange) {}
+
+void StoppingTests::update(double bestValue, int evaluationCount, double populationRange) {
+  const auto length = static_cast<std::size_t>(std::max(1, criteria_.loopsConvergence));
+  history_.push_front(bestValue);
+  if (history_.size() > length) history_.pop_back();
+  if (history_.size() == length) {
+    const double earlier = history_.back();
+    // Deliberately without an absolute value in the denominator: values of opposite sign give a negative change, and
+    // the search counts as converged.
+    relativeChange_ = 2.0 * std::abs(earlier - bestValue) / (bestValue + earlier);
+  }
+
+  if (evaluationCount >= criteria_.maxEvaluations) {
+    message_ = "Optimisation terminated: Maximum number of model evaluations reached";
+  }
+  if (criteria_.minChange > relativeChange_) {
+    message_ = "Optimisation terminated: Objective function convergence criterion met";
+  }
+  if (kConvergedPopulationRange > populationRange) {
+    message_ = "Optimisation terminated: Population converged";
+  }
+}
+
+}  // namespace mirevo

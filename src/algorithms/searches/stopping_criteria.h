@@ -1,0 +1,37 @@
+#pragma once
+
+#include <deque>
+#include <string_view>
+
+#include "algorithms/searches/search_settings.h"
+
+namespace mirevo {
+
+/// The normalised population range below which a population has converged. Fixed, not a setting.
+inline constexpr double kConvergedPopulationRange = 1.0e-5;
+
+/// The three tests that end a population search, made after every loop. All are made every time; of those that hold the
+/// last one gives the message.
+class StoppingTests final {
+ public:
+  explicit StoppingTests(const StoppingCriteria& criteria);
+
+  /// Makes the tests after a loop. `bestValue` is the population's best objective value; `populationRange` comes from
+  /// normalisedPopulationRange().
+  void update(double bestValue, int evaluationCount, double populationRange);
+
+  bool isMet() const { return !message_.empty(); }
+  /// Why the search stops; empty while it goes on.
+  std::string_view message() const { return message_; }
+  /// 2·|H − f| / (f + H) of the best value f and the one `loopsConvergence` − 1 loops earlier, H. Until there is such a
+  /// loop it is twice the smallest change asked for, so that the search cannot count as converged.
+  double relativeChange() const { return relativeChange_; }
+
+ private:
+  StoppingCriteria criteria_;
+  std::deque<double> history_;  ///< best value of each of the last `loopsConvergence` loops, newest first
+  double relativeChange_;
+  std::string_view message_;
+};
+
+}  // namespace mirevo

@@ -1,0 +1,228 @@
+#include "algorithms/surrogate/proposal_selector.h"
+
+#include <algorithm>
+#include <cmath>
+#include <limits>
+#include <numeric>
+#include <utility>
+
+#include "algorithms/surrogate/gaussian_process.h"
+#include "algorithms/surrogate/pattern_search.h"
+#include "algorithms/surrogate/quadratic_surrogate.h"
+#include "parameters/search_space.h"
+
+namespace mirevo {
+namespace {
+
+/// Of the width of a neighbourhood: places no farther apart in any coordinate are the same, and a second run tells
+/// nothing.
+constexpr double kSamePlace = 1.0e-3;
+
+/// Of a Gaussian process: the time for a fit grows with the third power of the neighbourhood.
+constexpr std::size_t kMostNeighbours = 100;
+
+/// Stands for a prediction where a run is likely to fail: better only than that of a run made again.
+constexpr double kLikelyToFail = std::numeric_limits<double>::max();
+constexpr double kMadeAgain = std::numeric_limits<double>::infinity();
+
+double squaredDistance(const std::vector<double>& a, const std::vector<double>& b) {
+  double sum = 0.0;
+  for (std::size_t j = 0; j < a.size(); ++j) sum += (a[j] - b[j]) * (a[j] - b[j]);
+  return sum;
+}
+
+std::unique_ptr<SurrogateModel> makeModel(int type) {
+  if (type == 1) return std::make_unique<GaussianProcess>();
+  return std::make_unique<QuadraticSurrogate>();
+}
+
+}  // namespace
+
+std::string_view surrogateModelName(const SurrogateSettings& settings) {
+  return settings.modelType == 1 ? "Gaussian process" : "quadratic polynomial";
+}
+
+std::size_t neighbourhoodSize(const SurrogateSettings& settings, std::size_t n) {
+  if (settings.neighbourhoodSize > 0) return static_cast<std::size_t>(settings.neighbourhoodSize);
+  const std::size_t coefficients = quadraticCoefficientCount(n);
+  return settings.modelType == 1 ? std::min(3 * coefficients, kMostNeighbours) : 3 * coefficients / 2;
+}
+
+std::size_t leastSetCount(const SurrogateSettings& settings, std::size_t n) {
+  // Fewer than a plane needs say nothing about the shape of the objective.
+  return settings.modelType == 0 ? quadraticCoefficientCount(n) : n + 2;
+}
+
+std::size_t proposalsPerRun(const SurrogateSettings& settings) {
+  const int rate = std::clamp(settings.samplingRate, 1, 100);
+  return static_cast<std::size_t>((100 + rate - 1) / rate);
+}
+
+ProposalSelector::ProposalSelector(const SurrogateSettings& settings, SearchBounds bounds)
+    : settings_(settings), bounds_(std::move(bounds)), model_(makeModel(settings.modelType)) {}
+
+std::vector<double> ProposalSelector::scaled(const ParameterSet& set) const {
+  std::vector<double> point(set.size());
+  for (std::size_t j = 0; j < set.size(); ++j) {
+    const double width = bounds_.upper[j] - bounds_.lower[j];
+    double value = set[j];
+    if (!bounds_.isInteger.empty() && bounds_.isInteger[j]) {
+      bool failed = false;
+      value = 0.5 + TransformParameterValue(value, bounds_.lower[j], TransformationType::integer,
+                                            TransformDirection::backward, failed);
+    }
+    point[j] = width > 0.0 ? (value - bounds_.lower[j]) / width : 0.0;
+  }
+  return point;
+}
+
+ParameterSet ProposalSelector::unscaled(const std::vector<double>& point) const {
+  ParameterSet set(point.size());
+  for (std::size_t j = 0; j < set.size(); ++j) {
+    const double value = bounds_.lower[j] + point[j] * (bounds_.upper[j] - bounds_.lower[j]);
+    set[j] = std::clamp(value, bounds_.lower[j], bounds_.upper[j]);
+  }
+  return set;
+}
+
+bool ProposalSelector::isKnown(const std::vector<double>& point) const {
+  const auto isAmong = [&](const auto& points) {
+    return std::find(points.begin(), points.end(), point) != points.end();
+  };
+  return isAmong(points_) || isAmong(failed_);
+}
+
+bool ProposalSelector::isLikelyToFail(const std::vector<double>& point) const {
+  const auto leastDistance = [&point](const auto& others) {
+    double least = std::numeric_limits<double>::infinity();
+    for (const auto& other : others) least = std::min(least, squaredDistance(other, point));
+    return least;
+  };
+  return !failed_.empty() && leastDistance(failed_) < leastDistance(points_);
+}
+
+void ProposalSelector::note(const ParameterSet& set, const EvaluationResult& result) {
+  std::vector<double> point = scaled(set);
+  if (isKnown(point)) return;
+  if (!isUsable(result)) {
+    failed_.push_back(std::move(point));
+    return;
+  }
+  points_.push_back(std::move(point));
+  values_.push_back(result.aggregate);
+}
+
+bool ProposalSelector::isActive(int loop) const {
+  return loop >= settings_.initialGenerations && points_.size() >= leastSetCount(settings_, bounds_.size());
+}
+
+std::vector<std::size_t> ProposalSelector::nearest(const std::vector<double>& point) const {
+  std::vector<std::size_t> places(points_.size());
+  std::iota(places.begin(), places.end(), std::size_t{0});
+  const std::size_t wanted = std::max(neighbourhoodSize(settings_, bounds_.size()), std::size_t{2});
+  if (places.size() <= wanted) return places;
+  std::vector<double> distances;
+  distances.reserve(points_.size());
+  for (const auto& other : points_) distances.push_back(squaredDistance(other, point));
+  const auto byDistance = [&](std::size_t a, std::size_t b) {
+    return distances[a] != distances[b] ? distances[a] < distances[b] : a < b;
+  };
+  std::nth_element(places.begin(), places.begin() + static_cast<std::ptrdiff_t>(wanted), places.end(), byDistance);
+  places.resize(wanted);
+  std::sort(places.begin(), places.end());
+  return places;
+}
+
+bool ProposalSelector::fitTo(const std::vector<std::size_t>& places) {
+  if (!fitted_.empty() && places == fitted_) return true;
+  fitted_.clear();
+  std::vector<std::vector<double>> points;
+  std::vector<double> values;
+  for (const std::size_t place : places) {
+    points.push_back(points_[place]);
+    values.push_back(values_[place]);
+  }
+  if (!model_->fit(points, values)) return false;
+  fitted_ = places;
+  return true;
+}
+
+std::vector<double> ProposalSelector::predict(std::span<const ParameterSet> proposals) {
+  std::vector<double> predictions;
+  for (const ParameterSet& proposal : proposals) {
+    const std::vector<double> point = scaled(proposal);
+    if (isKnown(point)) {
+      predictions.push_back(kMadeAgain);
+    } else if (isLikelyToFail(point)) {
+      predictions.push_back(kLikelyToFail);
+    } else if (fitTo(nearest(point))) {
+      predictions.push_back(model_->predict(point));
+    } else {
+      return {};
+    }
+  }
+  return predictions;
+}
+
+std::optional<ProposalSelector::MinimumInBox> ProposalSelector::minimumAround(const std::vector<double>& centre) {
+  const std::vector<std::size_t> neighbours = nearest(centre);
+  if (!fitTo(neighbours)) return std::nullopt;
+  Box box{centre, centre};
+  for (const std::size_t place : neighbours) {
+    for (std::size_t j = 0; j < centre.size(); ++j) {
+      box.lower[j] = std::min(box.lower[j], points_[place][j]);
+      box.upper[j] = std::max(box.upper[j], points_[place][j]);
+    }
+  }
+  // An integer parameter moves by whole steps, however narrow the box.
+  std::vector<double> leastMoves(centre.size(), 0.0);
+  for (std::size_t j = 0; j < bounds_.isInteger.size(); ++j) {
+    if (bounds_.isInteger[j]) leastMoves[j] = 1.0 / (bounds_.upper[j] - bounds_.lower[j]);
+  }
+  const bool hasIntegers =
+      std::find(bounds_.isInteger.begin(), bounds_.isInteger.end(), true) != bounds_.isInteger.end();
+  const auto asRun = [&](const std::vector<double>& point) { return hasIntegers ? scaled(unscaled(point)) : point; };
+  const auto predicted = [&](const std::vector<double>& trial) {
+    const std::vector<double> point = asRun(trial);
+    return isLikelyToFail(point) ? kLikelyToFail : model_->predict(point);
+  };
+  return MinimumInBox{asRun(patternSearch(predicted, centre, box, leastMoves)), box};
+}
+
+std::vector<PredictedMinimum> ProposalSelector::minima(std::span<const ParameterSet> centres) {
+  std::vector<PredictedMinimum> found;
+  std::vector<std::vector<double>> foundPoints;
+  for (std::size_t centre = 0; centre < centres.size(); ++centre) {
+    const std::optional<MinimumInBox> around = minimumAround(scaled(centres[centre]));
+    if (!around) continue;
+    const std::vector<double>& minimum = around->point;
+    const Box& box = around->box;
+    const auto isSamePlace = [&](const std::vector<double>& point) {
+      for (std::size_t j = 0; j < minimum.size(); ++j) {
+        if (std::abs(minimum[j] - point[j]) > kSamePlace * (box.upper[j] - box.lower[j])) return false;
+      }
+      return true;
+    };
+    const auto isNear = [&](const auto& points) { return std::any_of(points.begin(), points.end(), isSamePlace); };
+    if (isNear(points_) || isNear(failed_) || isNear(foundPoints)) continue;
+    found.push_back({unscaled(minimum), centre});
+    foundPoints.push_back(minimum);
+  }
+  return found;
+}
+
+std::vector<std::size_t> ProposalSelector::select(std::span<const ParameterSet> proposals, std::size_t count) {
+  std::vector<std::size_t> places(proposals.size());
+  std::iota(places.begin(), places.end(), std::size_t{0});
+  if (count >= places.size()) return places;
+  const std::vector<double> predictions = predict(proposals);
+  if (!predictions.empty()) {
+    std::stable_sort(places.begin(), places.end(),
+                     [&](std::size_t a, std::size_t b) { return isBetter(predictions[a], predictions[b]); });
+  }
+  places.resize(count);
+  std::sort(places.begin(), places.end());
+  return places;
+}
+
+}  // namespace mirevo

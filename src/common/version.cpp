@@ -1,0 +1,9 @@
+#include "common/version.h"
+
+namespace mirevo {
+
+std::string_view programVersion() {
+  return MIREVO_VERSION;
+}
+
+}  // namespace mirevo

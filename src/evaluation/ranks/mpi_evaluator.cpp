@@ -1,0 +1,139 @@
+#include "evaluation/ranks/mpi_evaluator.h"
+
+#include <chrono>
+#include <utility>
+
+#include <fmt/format.h>
+
+#include "common/fatal_error.h"
+
+namespace mirevo {
+namespace {
+
+/// Longest time between two looks at the cancellation; a message ends the wait.
+constexpr double kMasterPollSeconds = 0.5;
+
+void sendToWorkers(MessageChannel& channel, RankMessage tag, const std::string& content) {
+  for (int rank = 1; rank < channel.processCount(); ++rank) channel.send(rank, static_cast<int>(tag), content);
+}
+
+}  // namespace
+
+MpiEvaluator::MpiEvaluator(ModelRunner& runner, MessageChannel& channel, EvaluationObserver& observer,
+                           FailedRunPolicy& failedRuns, EarlierEvaluations* earlier)
+    : runner_(runner),
+      channel_(channel),
+      observer_(observer),
+      ledger_(observer, failedRuns, earlier),
+      workers_(static_cast<std::size_t>(channel.processCount() - 1)) {}
+
+std::vector<EvaluationResult> MpiEvaluator::evaluateParameterSets(std::span<const ParameterSet> sets,
+                                                                  DispatchMode mode) {
+  ledger_.begin(sets, mode);
+  startOnFreeWorkers();
+  while (!ledger_.isComplete()) {
+    const auto message = channel_.receive(kMasterPollSeconds);
+    if (message) handle(*message);
+    stopIfCancelled();
+    startOnFreeWorkers();
+  }
+  return ledger_.end();
+}
+
+void MpiEvaluator::startOnFreeWorkers() {
+  for (int rank = 1; rank < channel_.processCount(); ++rank) {
+    if (worker(rank).place && !worker(rank).set) startNext(rank);
+  }
+}
+
+void MpiEvaluator::startNext(int rank) {
+  while (const auto place = ledger_.takeNext()) {
+    stopIfCancelled();
+    auto failure = runner_.findUnrunnable(ledger_.set(*place));
+    if (!failure) {
+      channel_.send(rank, static_cast<int>(RankMessage::set),
+                    encode(SetMessage{ledger_.numberOf(*place), ledger_.set(*place)}));
+      worker(rank).set = *place;
+      ledger_.markInitiated(*place);
+      return;
+    }
+    ledger_.finish(*place, runner_.failedResult(std::move(*failure)));
+  }
+}
+
+void MpiEvaluator::handle(const Message& message) {
+  switch (static_cast<RankMessage>(message.tag)) {
+    case RankMessage::ready: {
+      const ReadyMessage& place = worker(message.rank).place.emplace(decodeReady(message.content));
+      observer_.message(
+          fmt::format("Worker {} is ready on {}, process folder {}", message.rank, place.host, place.processFolder));
+      return;
+    }
+    case RankMessage::result:
+      return takeResult(message.rank, decodeResult(message.content));
+    case RankMessage::failure:
+      failWith(message.rank, decodeFailure(message.content));
+    default:
+      fatalError("Error: MPI communication failed",
+                 fmt::format("the worker with rank {} sent a message of unknown kind {}", message.rank, message.tag));
+  }
+}
+
+void MpiEvaluator::takeResult(int rank, ResultMessage message) {
+  const auto place = std::exchange(worker(rank).set, std::nullopt);
+  if (!place) {
+    fatalError("Error: MPI communication failed",
+               fmt::format("the worker with rank {} sent a result that nobody asked for", rank));
+  }
+  EvaluationResult& result = message.result;
+  // Only here is the transformation known that was settled by the initial sample.
+  if (result.ok()) result.aggregate = runner_.aggregator().aggregate(result.objectiveValues);
+  if (ledger_.isFolderWanted(result)) {
+    channel_.send(rank, static_cast<int>(RankMessage::keepFolder), encode(KeepFolderMessage{ledger_.numberOf(*place)}));
+  }
+  ledger_.finish(*place, std::move(result), message.leftBehind);
+}
+
+void MpiEvaluator::failWith(int rank, const FailureMessage& failure) const {
+  const auto& place = workers_.at(static_cast<std::size_t>(rank - 1)).place;
+  std::string detail = failure.detail;
+  if (!detail.empty()) detail += '\n';
+  detail += fmt::format("reported by worker {}{}", rank, place ? " on " + place->host : "");
+  fatalError(failure.message, detail);
+}
+
+void MpiEvaluator::stopIfCancelled() {
+  constexpr const char* kCancelled = "EM: Simulation cancelled";
+  if (!observer_.isCancelled()) return;
+  observer_.message(kCancelled);
+  throw RunCancelled(kCancelled);
+}
+
+void MpiEvaluator::settleAggregates(std::span<EvaluationResult> sample) {
+  mirevo::settleAggregates(runner_.aggregator(), sample, observer_);
+}
+
+void beginWorkers(MessageChannel& channel, const BeginMessage& message) {
+  sendToWorkers(channel, RankMessage::begin, encode(message));
+}
+
+bool stopWorkers(MessageChannel& channel, double seconds, const std::function<void(const std::string&)>& warn) {
+  using Clock = std::chrono::steady_clock;
+  sendToWorkers(channel, RankMessage::stop, {});
+  const Clock::time_point start = Clock::now();
+  int farewells = 0;
+  while (farewells < channel.processCount() - 1) {
+    const double left = seconds - std::chrono::duration<double>(Clock::now() - start).count();
+    const auto message = channel.receive(left);
+    if (!message) return false;
+    if (message->tag == static_cast<int>(RankMessage::farewell)) ++farewells;
+    if (message->tag == static_cast<int>(RankMessage::failure)) {
+      const FailureMessage failure = decodeFailure(message->content);
+      warn(fmt::format("Worker {} met an error that no evaluation depended on: {}{}{}", message->rank, failure.message,
+                       failure.detail.empty() ? "" : "\n", failure.detail));
+    }
+  }
+  return true;
+}
+
+}  // namespace mirevo

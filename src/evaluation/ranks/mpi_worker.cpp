@@ -1,0 +1,101 @@
+#include "evaluation/ranks/mpi_worker.h"
+
+#include <utility>
+
+#include <fmt/format.h>
+
+#include "common/clock.h"
+#include "common/fatal_error.h"
+
+namespace mirevo {
+namespace {
+
+constexpr int kMaster = 0;
+constexpr int kSlot = 1;
+/// A wait without a model has no reason to end early; the channel's own naps grow no further anyway.
+constexpr double kIdleSeconds = 3600.0;
+/// Longest time between two looks for the stop message while the model runs; a model that ends ends the wait.
+constexpr double kBusyPollSeconds = 0.1;
+
+void sendToMaster(MessageChannel& channel, RankMessage tag, std::string content) {
+  channel.send(kMaster, static_cast<int>(tag), std::move(content));
+}
+
+Message await(MessageChannel& channel) {
+  while (true) {
+    if (auto message = channel.receive(kIdleSeconds)) return std::move(*message);
+  }
+}
+
+[[noreturn]] void refuse(const Message& message) {
+  fatalError("Error: MPI communication failed",
+             fmt::format("rank {} sent a message of kind {} out of turn", message.rank, message.tag));
+}
+
+bool isExecuting(ModelRunner& runner) {
+  std::int32_t executing = 0;
+  std::int32_t status = 0;
+  runner.launcher().isExecuting(kSlot, executing, status);
+  return executing != 0;
+}
+
+/// Runs the model with one set; nothing when the master says stop meanwhile.
+std::optional<ResultMessage> runModel(MessageChannel& channel, ModelRunner& runner, const SetMessage& message) {
+  if (auto failure = runner.prepareModelRun(message.set, kSlot))
+    return ResultMessage{runner.failedResult(*failure), {}};
+  while (isExecuting(runner)) {
+    runner.launcher().waitForChange(kBusyPollSeconds);
+    const auto arrived = channel.receive(0.0);
+    if (!arrived) continue;
+    if (arrived->tag != static_cast<int>(RankMessage::stop)) refuse(*arrived);
+    runner.launcher().haltProcesses();
+    return std::nullopt;
+  }
+  ResultMessage answer{runner.collect(kSlot), runner.launcher().leftBehind(kSlot)};
+  runner.keepOutputFiles(kSlot, message.number, answer.result);
+  return answer;
+}
+
+}  // namespace
+
+void runWorkerLoop(MessageChannel& channel, ModelRunner& runner) {
+  sendToMaster(channel, RankMessage::ready,
+               encode(ReadyMessage{hostName(), runner.launcher().getProcessFolder(kSlot)}));
+  std::vector<std::string> warnings;  // of what was done since the last result, told with the next one
+  while (true) {
+    const Message message = await(channel);
+    if (message.tag == static_cast<int>(RankMessage::stop)) return;
+    if (message.tag == static_cast<int>(RankMessage::keepFolder)) {
+      runner.keepFailedFolder(kSlot, decodeKeepFolder(message.content).number, warnings);
+      continue;
+    }
+    if (message.tag != static_cast<int>(RankMessage::set)) refuse(message);
+    auto result = runModel(channel, runner, decodeSet(message.content));
+    if (!result) return;
+    std::vector<std::string>& told = result->result.warnings;
+    told.insert(told.begin(), warnings.begin(), warnings.end());
+    warnings.clear();
+    sendToMaster(channel, RankMessage::result, encode(*result));
+  }
+}
+
+std::optional<BeginMessage> awaitBegin(MessageChannel& channel) {
+  const Message message = await(channel);
+  if (message.tag == static_cast<int>(RankMessage::begin)) return decodeBegin(message.content);
+  if (message.tag != static_cast<int>(RankMessage::stop)) refuse(message);
+  return std::nullopt;
+}
+
+void sayFarewell(MessageChannel& channel) {
+  sendToMaster(channel, RankMessage::farewell, {});
+}
+
+void reportFailure(MessageChannel& channel, const FailureMessage& failure) {
+  sendToMaster(channel, RankMessage::failure, encode(failure));
+  while (true) {
+    const Message message = await(channel);
+    if (message.tag == static_cast<int>(RankMessage::stop)) return;
+  }
+}
+
+}  // namespace mirevo

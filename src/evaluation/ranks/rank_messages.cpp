@@ -1,0 +1,234 @@
+#include "evaluation/ranks/rank_messages.h"
+
+#include <cstdint>
+#include <cstring>
+#include <optional>
+#include <type_traits>
+#include <vector>
+
+#include "common/fatal_error.h"
+
+namespace mirevo {
+namespace {
+
+/// The fields of a struct, named once for both directions: `archive` is a Writer or a Reader.
+template <class Struct>
+struct Layout;
+
+template <>
+struct Layout<BeginMessage> {
+  static void of(auto& archive, auto& message) { archive(message.setupFile, message.text); }
+};
+template <>
+struct Layout<SetMessage> {
+  static void of(auto& archive, auto& message) { archive(message.number, message.set); }
+};
+template <>
+struct Layout<ReadyMessage> {
+  static void of(auto& archive, auto& message) { archive(message.host, message.processFolder); }
+};
+template <>
+struct Layout<ResultMessage> {
+  static void of(auto& archive, auto& message) { archive(message.result, message.leftBehind); }
+};
+template <>
+struct Layout<KeepFolderMessage> {
+  static void of(auto& archive, auto& message) { archive(message.number); }
+};
+template <>
+struct Layout<FailureMessage> {
+  static void of(auto& archive, auto& message) { archive(message.message, message.detail); }
+};
+/// Without the number, which the master knows.
+template <>
+struct Layout<EvaluationResult> {
+  static void of(auto& archive, auto& result) {
+    archive(result.measureValues, result.objectiveValues, result.aggregate, result.simulatedValues, result.failure,
+            result.unusedObservations, result.warnings, result.shownSeries);
+  }
+};
+template <>
+struct Layout<PeriodSeries> {
+  static void of(auto& archive, auto& series) { archive(series.seconds, series.values); }
+};
+template <>
+struct Layout<EvaluationFailure> {
+  static void of(auto& archive, auto& failure) { archive(failure.kind, failure.reason, failure.lastOutput); }
+};
+template <>
+struct Layout<UnusedObservations> {
+  static void of(auto& archive, auto& unused) { archive(unused.measure, unused.usedCount, unused.text); }
+};
+
+template <class Value>
+constexpr bool kIsPlain = std::is_arithmetic_v<Value> || std::is_enum_v<Value>;
+
+/// Turns a message into bytes, field by field in the order in which they are given.
+class Writer final {
+ public:
+  template <class... Fields>
+  void operator()(const Fields&... fields) {
+    (put(fields), ...);
+  }
+  std::string take() { return std::move(content_); }
+
+ private:
+  template <class Value>
+  void put(const Value& value) {
+    if constexpr (kIsPlain<Value>) {
+      content_.append(reinterpret_cast<const char*>(&value), sizeof value);
+    } else {
+      Layout<Value>::of(*this, value);
+    }
+  }
+  void put(const std::string& text) {
+    put(static_cast<std::uint64_t>(text.size()));
+    content_.append(text);
+  }
+  template <class Item>
+  void put(const std::vector<Item>& items) {
+    put(static_cast<std::uint64_t>(items.size()));
+    for (const Item& item : items) put(item);
+  }
+  void put(const std::vector<double>& values) {
+    put(static_cast<std::uint64_t>(values.size()));
+    content_.append(reinterpret_cast<const char*>(values.data()), values.size() * sizeof(double));
+  }
+  template <class Value>
+  void put(const std::optional<Value>& value) {
+    put(value.has_value());
+    if (value) put(*value);
+  }
+
+  std::string content_;
+};
+
+/// Fills a message with what a Writer made of it.
+class Reader final {
+ public:
+  explicit Reader(std::string_view content) : rest_(content) {}
+
+  template <class... Fields>
+  void operator()(Fields&... fields) {
+    (get(fields), ...);
+  }
+  void expectEnd() const {
+    if (!rest_.empty()) refuse();
+  }
+
+ private:
+  template <class Value>
+  void get(Value& value) {
+    if constexpr (kIsPlain<Value>) {
+      std::memcpy(&value, bytes(sizeof value).data(), sizeof value);
+    } else {
+      Layout<Value>::of(*this, value);
+    }
+  }
+  void get(bool& value) { value = bytes(1).front() != '\0'; }
+  void get(std::string& text) { text = bytes(count()); }
+  template <class Item>
+  void get(std::vector<Item>& items) {
+    items.clear();
+    for (auto left = count(); left > 0; --left) get(items.emplace_back());  // ends with the content, whatever the count
+  }
+  void get(std::vector<double>& values) {
+    const auto size = count();
+    if (size > rest_.size() / sizeof(double)) refuse();
+    values.resize(size);
+    if (size > 0) std::memcpy(values.data(), bytes(size * sizeof(double)).data(), size * sizeof(double));
+  }
+  template <class Value>
+  void get(std::optional<Value>& value) {
+    bool hasValue = false;
+    get(hasValue);
+    value.reset();
+    if (hasValue) get(value.emplace());
+  }
+
+  std::uint64_t count() {
+    std::uint64_t value = 0;
+    get(value);
+    return value;
+  }
+  std::string_view bytes(std::uint64_t count) {
+    if (count > rest_.size()) refuse();
+    const std::string_view taken = rest_.substr(0, count);
+    rest_.remove_prefix(count);
+    return taken;
+  }
+  [[noreturn]] static void refuse() {
+    fatalError("Error: MPI communication failed",
+               "a message has another form than expected: do all processes of the job run the same Mirevo?");
+  }
+
+  std::string_view rest_;
+};
+
+template <class Message>
+std::string written(const Message& message) {
+  Writer writer;
+  Layout<Message>::of(writer, message);
+  return writer.take();
+}
+
+template <class Message>
+Message read(std::string_view content) {
+  Reader reader(content);
+  Message message;
+  Layout<Message>::of(reader, message);
+  reader.expectEnd();
+  return message;
+}
+
+}  // namespace
+
+std::string encode(const BeginMessage& message) {
+  return written(message);
+}
+
+BeginMessage decodeBegin(std::string_view content) {
+  return read<BeginMessage>(content);
+}
+
+std::string encode(const SetMessage& message) {
+  return written(message);
+}
+
+SetMessage decodeSet(std::string_view content) {
+  return read<SetMessage>(content);
+}
+
+std::string encode(const ReadyMessage& message) {
+  return written(message);
+}
+
+ReadyMessage decodeReady(std::string_view content) {
+  return read<ReadyMessage>(content);
+}
+
+std::string encode(const ResultMessage& message) {
+  return written(message);
+}
+
+ResultMessage decodeResult(std::string_view content) {
+  return read<ResultMessage>(content);
+}
+
+std::string encode(const KeepFolderMessage& message) {
+  return written(message);
+}
+
+KeepFolderMessage decodeKeepFolder(std::string_view content) {
+  return read<KeepFolderMessage>(content);
+}
+
+std::string encode(const FailureMessage& message) {
+  return written(message);
+}
+
+FailureMessage decodeFailure(std::string_view content) {
+  return read<FailureMessage>(content);
+}
+
+}  // namespace mirevo

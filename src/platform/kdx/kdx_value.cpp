@@ -1,0 +1,198 @@
+#include "platform/kdx/kdx_value.h"
+
+#include <optional>
+
+#include <fmt/format.h>
+
+#include "common/text.h"
+
+namespace mirevo {
+namespace {
+
+bool isBlank(char c) {
+  return c == ' ' || c == '\t' || c == '\r';
+}
+bool isDigit(char c) {
+  return c >= '0' && c <= '9';
+}
+bool isControl(char c) {
+  return static_cast<unsigned char>(c) < 0x20 && c != '\t';
+}
+
+/// Takes `least` to `most` digits off the front of `text`.
+std::optional<std::int32_t> takeDigits(std::string_view& text, std::size_t least, std::size_t most) {
+  std::int32_t value = 0;
+  std::size_t count = 0;
+  while (count < most && count < text.size() && isDigit(text[count])) value = value * 10 + (text[count++] - '0');
+  if (count < least) return std::nullopt;
+  text.remove_prefix(count);
+  return value;
+}
+
+bool takeCharacter(std::string_view& text, char c) {
+  if (text.empty() || text.front() != c) return false;
+  text.remove_prefix(1);
+  return true;
+}
+
+/// Reads the text between quotes, the same quote inside written twice.
+std::variant<KdxValue, KdxSyntaxError> readText(KdxCursor& cursor) {
+  const KdxPosition start = cursor.position();
+  const std::string_view line = cursor.restOfLine();
+  const char quote = line.front();
+  std::string content;
+  std::size_t i = 1;
+  while (true) {
+    if (i >= line.size()) {
+      return KdxSyntaxError{start, fmt::format("expected a closing {} before the end of the line", quote)};
+    }
+    if (isControl(line[i])) {
+      return KdxSyntaxError{{start.line, start.column + static_cast<int>(i)},
+                            fmt::format("expected a text without control characters, found character {}",
+                                        static_cast<int>(static_cast<unsigned char>(line[i])))};
+    }
+    if (line[i] == quote) {
+      if (i + 1 >= line.size() || line[i + 1] != quote) break;
+      ++i;
+    }
+    content += line[i++];
+  }
+  cursor.advance(i + 1);
+  return KdxValue{std::move(content), start};
+}
+
+/// Digits alone beyond 32 bits are a real: they are good where a real is wanted and refused where an integer is.
+std::optional<KdxValue> readNumber(std::string_view word, KdxPosition start) {
+  if (const auto integer = parseInteger(word)) return KdxValue{*integer, start};
+  if (const auto real = parseReal(word)) return KdxValue{*real, start};
+  return std::nullopt;
+}
+
+}  // namespace
+
+KdxCursor::KdxCursor(std::string_view text) : text_(text) {
+  if (text_.starts_with("\xEF\xBB\xBF")) text_.remove_prefix(3);
+}
+
+bool KdxCursor::atLineEndOrComment() const {
+  return peek() == '\n' || text_.substr(place_, 2) == "//";
+}
+
+std::string_view KdxCursor::restOfLine() const {
+  const std::string_view rest = text_.substr(place_, text_.find('\n', place_) - place_);
+  return rest.ends_with('\r') ? rest.substr(0, rest.size() - 1) : rest;
+}
+
+KdxPosition KdxCursor::position() const {
+  return {line_, static_cast<int>(place_ - lineStart_) + 1};
+}
+
+std::string KdxCursor::describeNext() const {
+  if (atEnd()) return "the end of the file";
+  const std::string_view rest = trim(restOfLine());
+  return rest.empty() ? "the end of the line" : quotedForMessage(rest);
+}
+
+void KdxCursor::skipBlanks() {
+  while (!atEnd() && isBlank(text_[place_])) ++place_;
+}
+
+void KdxCursor::skipBlanksCommentsAndLineEnds() {
+  while (true) {
+    skipBlanks();
+    if (atEnd() || !atLineEndOrComment()) return;
+    const std::size_t end = text_.find('\n', place_);
+    if (end == std::string_view::npos) {
+      place_ = text_.size();
+      return;
+    }
+    place_ = end + 1;
+    lineStart_ = place_;
+    ++line_;
+  }
+}
+
+std::string_view KdxCursor::takeWhile(bool (*belongs)(char)) {
+  const std::size_t start = place_;
+  while (!atEnd() && belongs(text_[place_])) ++place_;
+  return text_.substr(start, place_ - start);
+}
+
+std::variant<KdxValue, KdxSyntaxError> readKdxValue(KdxCursor& cursor, char separator) {
+  const KdxPosition start = cursor.position();
+  if (cursor.atLineEndOrComment()) {
+    return KdxSyntaxError{start, fmt::format("expected a value after '{}', found the end of the line", separator)};
+  }
+  if (cursor.peek() == '\'' || cursor.peek() == '"') return readText(cursor);
+
+  std::string_view item = cursor.restOfLine();
+  item = item.substr(0, item.find(','));
+  item = trimTrailing(item.substr(0, item.find("//")));
+  if (const auto date = parseKdxDate(item)) {
+    cursor.advance(item.size());
+    return KdxValue{*date, start};
+  }
+  const std::string_view word = item.substr(0, item.find_first_of(" \t"));
+  if (auto number = readNumber(word, start)) {
+    cursor.advance(word.size());
+    return *std::move(number);
+  }
+  return KdxSyntaxError{
+      start, fmt::format("expected a number, a date or a text between quotes, found {}", quotedForMessage(item))};
+}
+
+std::optional<DateRecord> parseKdxDate(std::string_view text) {
+  text = trim(text);
+  DateRecord date{};
+  // Four digits of the year keep every count of days small.
+  const auto year = takeDigits(text, 4, 4);
+  if (!year || !takeCharacter(text, '-')) return std::nullopt;
+  const auto month = takeDigits(text, 1, 2);
+  if (!month || !takeCharacter(text, '-')) return std::nullopt;
+  const auto day = takeDigits(text, 1, 2);
+  if (!day) return std::nullopt;
+  date[date_field::kYear] = *year;
+  date[date_field::kMonth] = *month;
+  date[date_field::kDay] = *day;
+  if (text.empty()) return date;
+
+  if (!takeCharacter(text, 'T')) {
+    if (!isBlank(text.front())) return std::nullopt;
+    text = trim(text);
+  }
+  const auto hour = takeDigits(text, 1, 2);
+  if (!hour || !takeCharacter(text, ':')) return std::nullopt;
+  const auto minute = takeDigits(text, 2, 2);
+  if (!minute) return std::nullopt;
+  date[date_field::kHour] = *hour;
+  date[date_field::kMinute] = *minute;
+  if (text.empty()) return date;
+
+  const auto second = takeCharacter(text, ':') ? takeDigits(text, 2, 2) : std::nullopt;
+  if (!second || !text.empty()) return std::nullopt;
+  date[date_field::kSecond] = *second;
+  return date;
+}
+
+std::string formatKdxDate(const DateRecord& date) {
+  std::string text = fmt::format("{:04}-{:02}-{:02} {:02}:{:02}", date[date_field::kYear], date[date_field::kMonth],
+                                 date[date_field::kDay], date[date_field::kHour], date[date_field::kMinute]);
+  if (date[date_field::kSecond] != 0) text += fmt::format(":{:02}", date[date_field::kSecond]);
+  return text;
+}
+
+std::string quotedForMessage(std::string_view text) {
+  constexpr std::size_t kLongest = 60;
+  const bool cut = text.size() > kLongest;
+  if (cut) {
+    std::size_t end = kLongest;
+    while (end > 0 && (static_cast<unsigned char>(text[end]) & 0xC0U) == 0x80U) --end;  // whole UTF-8 characters
+    text = text.substr(0, end);
+  }
+  std::string quoted = "\"";
+  for (const char c : text) quoted += isControl(c) || c == '\x7F' ? '?' : c;
+  quoted += cut ? "...\"" : "\"";
+  return quoted;
+}
+
+}  // namespace mirevo

@@ -1,0 +1,427 @@
+#include "platform/processes/posix_process_launcher.h"
+
+#include <algorithm>
+#include <array>
+#include <cassert>
+#include <cerrno>
+#include <cmath>
+#include <csignal>
+#include <cstring>
+#include <ctime>
+#include <fcntl.h>
+#include <filesystem>
+#include <limits>
+#include <new>
+#include <optional>
+#include <poll.h>
+#include <span>
+#include <string_view>
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <fmt/format.h>
+
+#include "common/clock.h"
+#include "common/fatal_error.h"
+#include "common/files.h"
+#include "common/text.h"
+#include "platform/processes/argument_text.h"
+#include "platform/processes/process_folder.h"
+
+namespace mirevo {
+namespace {
+
+/// Variables by which the usual run-time libraries choose their number of threads.
+constexpr std::array<std::string_view, 9> kThreadVariables = {
+    "OMP_NUM_THREADS",     "OMP_THREAD_LIMIT",       "OPENBLAS_NUM_THREADS", "GOTO_NUM_THREADS", "MKL_NUM_THREADS",
+    "NUMEXPR_NUM_THREADS", "VECLIB_MAXIMUM_THREADS", "BLIS_NUM_THREADS",     "RAYON_NUM_THREADS"};
+
+constexpr std::size_t kOutputTailBytes = 65536;
+constexpr std::size_t kOutputLineBytes = 400;
+/// How long a killed process may take to be gone; one that waits for a lost network drive may take for ever.
+constexpr double kKilledSeconds = 10.0;
+constexpr int kGroupLookMilliseconds = 20;
+
+std::string baseName(const std::string& path) {
+  return std::filesystem::path(path).filename().string();
+}
+
+/// Opens with a number above 2, so that it can be moved onto the standard descriptors of a child.
+int openAboveStandard(const char* path, int flags, unsigned mode) {
+  const int fd = ::open(path, flags | O_CLOEXEC, mode);
+  if (fd < 0 || fd > STDERR_FILENO) return fd;
+  const int moved = ::fcntl(fd, F_DUPFD_CLOEXEC, STDERR_FILENO + 1);
+  const int error = errno;
+  ::close(fd);
+  errno = error;
+  return moved;
+}
+
+bool liesIn(const std::filesystem::path& path, const std::filesystem::path& folder) {
+  return std::mismatch(folder.begin(), folder.end(), path.begin(), path.end()).first == folder.end();
+}
+
+/// Why an existing file could not be executed because of its first line, if that is why.
+std::string interpreterHint(const std::string& file) {
+  std::array<char, 256> head{};
+  const int fd = ::open(file.c_str(), O_RDONLY | O_CLOEXEC);
+  if (fd < 0) return {};
+  const ssize_t length = ::read(fd, head.data(), head.size());
+  ::close(fd);
+  const std::string_view text(head.data(), static_cast<std::size_t>(std::max<ssize_t>(length, 0)));
+  if (!text.starts_with("#!")) return {};
+  const std::string_view line = text.substr(2, text.find('\n') == std::string_view::npos ? 254 : text.find('\n') - 2);
+  if (line.ends_with('\r')) {
+    return fmt::format("; its first line asks for \"{}\" and ends in a carriage return: save it with LF line ends",
+                       trim(line));
+  }
+  return fmt::format("; its first line asks for \"{}\"", trim(line));
+}
+
+/// The end of a file, at most `kOutputTailBytes`.
+std::string readTail(int fd) {
+  struct stat status {};
+  if (fd < 0 || ::fstat(fd, &status) != 0) return {};
+  const off_t start = std::max<off_t>(0, status.st_size - static_cast<off_t>(kOutputTailBytes));
+  std::string text(static_cast<std::size_t>(status.st_size - start), '\0');
+  const ssize_t length = text.empty() ? 0 : ::pread(fd, text.data(), text.size(), start);
+  text.resize(static_cast<std::size_t>(std::max<ssize_t>(length, 0)));
+  return text;
+}
+
+/// Returns when no process of these groups runs any more, or after `seconds`.
+void awaitEndOfGroups(std::span<const pid_t> groups, double seconds) {
+  const double deadline = runTimeClock() + seconds;
+  while (!runningMembers(groups).empty() && runTimeClock() < deadline) {
+    const timespec pause{0, kGroupLookMilliseconds * 1'000'000L};
+    ::nanosleep(&pause, nullptr);
+  }
+}
+
+/// A line of output made fit for a log: no control characters, not too long.
+std::string printable(std::string_view line) {
+  std::string text(line.substr(0, kOutputLineBytes));
+  for (char& c : text) {
+    if (static_cast<unsigned char>(c) < ' ' || c == '\x7f') c = ' ';
+  }
+  return std::string(trimTrailing(text));
+}
+
+}  // namespace
+
+PosixProcessLauncher::~PosixProcessLauncher() {
+  haltProcesses();
+  closeDescriptors();
+}
+
+void PosixProcessLauncher::closeDescriptors() {
+  for (Slot& slot : slots_) {
+    if (slot.log >= 0) ::close(slot.log);
+    slot.log = -1;
+  }
+  if (nullInput_ >= 0) ::close(nullInput_);
+  nullInput_ = -1;
+}
+
+bool PosixProcessLauncher::initialise(const LauncherSettings& settings) {
+  assert(!settings.batchItems.empty() && settings.slotCount > 0);
+  haltProcesses();
+  closeDescriptors();
+  slots_.clear();
+  // Where the program was started with this signal ignored, the kernel would forget how its children ended.
+  ::signal(SIGCHLD, SIG_DFL);
+  graceSeconds_ = settings.graceSeconds;
+  maxSeconds_ = settings.maxSeconds;
+  try {
+    std::vector<std::vector<std::string>> arguments;
+    for (const BatchItem& item : settings.batchItems) {
+      std::string reason;
+      auto words = splitArguments(item.arguments, reason);
+      if (!words) fatalError(fmt::format("Arguments of {}: {}: {}", item.batchFileName, reason, item.arguments));
+      if (!liesIn(item.batchFileName, settings.baseFolder)) {
+        fatalError(fmt::format("{} does not lie in the model's folder {}", item.batchFileName, settings.baseFolder));
+      }
+      arguments.push_back(std::move(*words));
+    }
+    nullInput_ = openAboveStandard("/dev/null", O_RDONLY, 0);
+    if (nullInput_ < 0) fatalError(fmt::format("Unable to open /dev/null: {}", std::strerror(errno)));
+    prepareEnvironment(settings.useSingleThread);
+    groups_ = std::make_unique<ProcessGroupTable>(settings.slotCount);
+    groups_->makeCurrent();
+    guard_ = std::make_unique<ChildGuard>();
+    std::string reason;
+    if (!guard_->start(*groups_, mark_, reason))
+      fatalError("Unable to start the guard of the model's processes: " + reason);
+    slots_.reserve(static_cast<std::size_t>(settings.slotCount));
+    for (int number = 1; number <= settings.slotCount; ++number) {
+      if (settings.isCancelled && settings.isCancelled()) throw RunCancelled();
+      prepareSlot(settings, number, arguments);
+    }
+  } catch (const FatalError& error) {
+    lastError_ = error.message();
+    return false;
+  } catch (const std::bad_alloc&) {
+    lastError_ = std::strerror(ENOMEM);
+    return false;
+  }
+  lastError_.clear();
+  return true;
+}
+
+void PosixProcessLauncher::prepareSlot(const LauncherSettings& settings, int number,
+                                       const std::vector<std::vector<std::string>>& arguments) {
+  Slot& slot = slots_.emplace_back();
+  slot.folder = settings.processFolderPrefix + std::to_string(settings.firstFolderNumber + number - 1);
+  std::error_code failed;
+  const auto resolved = [&failed](const std::string& folder) {
+    auto path = std::filesystem::weakly_canonical(folder, failed);
+    if (failed) fatalError(fmt::format("Unable to look at {}: {}", folder, failed.message()));
+    return path;
+  };
+  if (liesIn(resolved(settings.baseFolder), resolved(slot.folder))) {
+    fatalError(fmt::format("The model's folder {} lies in the process folder {}, which is made anew for every run",
+                           settings.baseFolder, slot.folder));
+  }
+  std::filesystem::create_directories(std::filesystem::path(slot.folder).parent_path(), failed);
+  makeProcessFolder(settings.baseFolder, slot.folder, settings.processFolderPrefix);
+  if (!renewLog(slot)) {
+    fatalError(fmt::format("Unable to create {}/{}: {}", slot.folder, kBatchLogName, std::strerror(errno)));
+  }
+  for (std::size_t i = 0; i < settings.batchItems.size(); ++i) {
+    std::string file = slot.folder + settings.batchItems[i].batchFileName.substr(settings.baseFolder.size());
+    std::string folder = std::filesystem::path(file).parent_path().string();
+    slot.commands.emplace_back(std::move(file), std::move(folder), arguments[i]);
+  }
+}
+
+void PosixProcessLauncher::prepareEnvironment(bool useSingleThread) {
+  environmentTexts_.clear();
+  environment_.clear();
+  for (char** variable = ::environ; variable != nullptr && *variable != nullptr; ++variable) {
+    const std::string_view text = *variable;
+    const std::string_view name = text.substr(0, text.find('='));
+    const bool replaced =
+        useSingleThread && std::find(kThreadVariables.begin(), kThreadVariables.end(), name) != kThreadVariables.end();
+    if (!replaced) environmentTexts_.emplace_back(text);
+  }
+  if (useSingleThread) {
+    for (const std::string_view name : kThreadVariables) environmentTexts_.push_back(fmt::format("{}=1", name));
+  }
+  environmentTexts_.emplace_back(mark_.variable());
+  for (std::string& text : environmentTexts_) environment_.push_back(text.data());
+  environment_.push_back(nullptr);
+}
+
+std::string PosixProcessLauncher::getProcessFolder(int slot) const {
+  return slotAt(slot).folder;
+}
+
+std::atomic<pid_t>& PosixProcessLauncher::groupEntry(const Slot& slot) const {
+  return groups_->entries()[static_cast<std::size_t>(&slot - slots_.data())];
+}
+
+/// An empty log for the next batch. The one of the last batch serves again when nothing was printed and it is still
+/// there, which saves removing and creating a file every run; it is never truncated, as a process of an earlier run may
+/// still hold it and because that costs more.
+bool PosixProcessLauncher::renewLog(Slot& slot) {
+  struct stat status {};
+  if (slot.log >= 0 && ::fstat(slot.log, &status) == 0 && status.st_size == 0 && status.st_nlink > 0) return true;
+  if (slot.log >= 0) ::close(slot.log);
+  const std::string path = slot.folder + "/" + kBatchLogName;
+  slot.log = -1;
+  if (::unlink(path.c_str()) != 0 && errno != ENOENT) return false;
+  slot.log = openAboveStandard(path.c_str(), O_RDWR | O_CREAT | O_EXCL | O_APPEND, 0666);
+  return slot.log >= 0;
+}
+
+void PosixProcessLauncher::createProcesses(int slotNumber) {
+  Slot& slot = slotAt(slotNumber);
+  assert(slot.pidfd < 0);
+  slot.item = 0;
+  slot.failure = {};
+  slot.leftBehind.clear();
+  slot.started = clock_();
+  slot.overdue.reset();
+  if (!renewLog(slot)) {
+    slot.failure = {
+        BatchFailure::Kind::couldNotStart, errno,
+        fmt::format("{} could not be started: unable to create {}/{}: {}", baseName(slot.commands.front().file()),
+                    slot.folder, kBatchLogName, std::strerror(errno))};
+    return;
+  }
+  startItem(slot);
+}
+
+void PosixProcessLauncher::startItem(Slot& slot) {
+  const SpawnCommand& command = slot.commands[slot.item];
+  const SpawnSurroundings surroundings{environment_.data(), nullInput_, slot.log, &groupEntry(slot)};
+  const SpawnedProcess process = spawnProcess(command, surroundings);
+  if (process.error == 0) {
+    slot.pidfd = process.pidfd;
+    slot.group = process.id;
+    return;
+  }
+  std::string hint;
+  if (process.error == ENOENT) hint = interpreterHint(command.file());
+  slot.failure = {BatchFailure::Kind::couldNotStart, process.error,
+                  fmt::format("{} could not be {}: {}{}", baseName(command.file()), process.failedStep,
+                              std::strerror(process.error), hint)};
+}
+
+void PosixProcessLauncher::isExecuting(int slotNumber, std::int32_t& executing, std::int32_t& status) {
+  Slot& slot = slotAt(slotNumber);
+  if (slot.pidfd >= 0) {
+    // Looked at and not reaped: while it is there its number cannot become another group's.
+    siginfo_t ended{};
+    const int result = ::waitid(P_PIDFD, static_cast<id_t>(slot.pidfd), &ended, WEXITED | WNOHANG | WNOWAIT);
+    if (result == 0 && ended.si_pid != 0) {
+      finishItem(slot, ended.si_code, ended.si_status);
+    } else if (result == 0) {
+      endOverdue(slot);
+    } else if (result < 0 && errno == ECHILD) {  // something else in this program has reaped it
+      endRestOfGroup(slot);
+      slot.failure = {BatchFailure::Kind::exitCode, -1,
+                      baseName(slot.commands[slot.item].file()) + " has ended, but how could not be learned"};
+    }
+  }
+  executing = slot.pidfd >= 0 ? 1 : 0;
+  status = static_cast<std::int32_t>(slot.failure.kind == BatchFailure::Kind::none ? BatchStatus::succeeded
+                                                                                   : BatchStatus::failed);
+}
+
+/// The first process of the item's group has ended: ends the rest of the group and starts the batch's next item.
+void PosixProcessLauncher::finishItem(Slot& slot, int code, int status) {
+  endRestOfGroup(slot);
+  const std::string name = baseName(slot.commands[slot.item].file());
+  if (slot.overdue) {  // however it took its end
+    slot.failure = {BatchFailure::Kind::timedOut, 0,
+                    fmt::format("{} was ended because it ran longer than {:g} seconds", name, maxSeconds_)};
+  } else if (code != CLD_EXITED) {
+    const char* description = ::sigdescr_np(status);
+    slot.failure = {BatchFailure::Kind::signal, status,
+                    fmt::format("{} was ended by signal {}{}", name, status,
+                                description == nullptr ? "" : fmt::format(" ({})", description))};
+  } else if (status != 0) {
+    slot.failure = {BatchFailure::Kind::exitCode, status, fmt::format("{} exited with code {}", name, status)};
+  } else if (slot.item + 1 < slot.commands.size()) {
+    ++slot.item;
+    startItem(slot);
+  }
+}
+
+/// Ends a batch that has run for too long, without waiting for it: SIGTERM first, and SIGKILL when it has not ended
+/// within the grace time.
+void PosixProcessLauncher::endOverdue(Slot& slot) {
+  const double now = clock_();
+  if (slot.overdue) {
+    if (now - *slot.overdue >= graceSeconds_) ::kill(-slot.group, SIGKILL);
+  } else if (maxSeconds_ > 0.0 && now - slot.started > maxSeconds_) {
+    slot.overdue = now;
+    ::kill(-slot.group, SIGTERM);
+  }
+}
+
+/// Until a running slot's batch has to be looked at though it has not ended.
+double PosixProcessLauncher::secondsToLook(const Slot& slot) const {
+  constexpr double kNever = std::numeric_limits<double>::infinity();
+  constexpr double kShortest = 0.001;
+  if (!slot.overdue) return maxSeconds_ > 0.0 ? std::max(slot.started + maxSeconds_ - clock_(), kShortest) : kNever;
+  const double grace = *slot.overdue + graceSeconds_ - clock_();
+  return grace > 0.0 ? std::max(grace, kShortest) : kNever;  // killed: its end is all there is to wait for
+}
+
+/// Reaps the group's ended first process and ends what it left behind. The group is stopped first, so that between
+/// being seen and being ended nobody in it can go away, or start more.
+void PosixProcessLauncher::endRestOfGroup(Slot& slot) {
+  ::kill(-slot.group, SIGSTOP);
+  siginfo_t ignored{};
+  while (::waitid(P_PIDFD, static_cast<id_t>(slot.pidfd), &ignored, WEXITED) < 0 && errno == EINTR) {
+  }
+  ::close(slot.pidfd);
+  slot.pidfd = -1;
+  // With its first process reaped a group without others is gone; one with others keeps its number.
+  if (::kill(-slot.group, 0) == 0) {
+    const auto members = runningMembers(std::span(&slot.group, 1));
+    ::kill(-slot.group, SIGKILL);
+    if (!members.empty()) {
+      std::string names;
+      for (const GroupMember& member : members) {
+        names += fmt::format("{}{} ({})", names.empty() ? "" : ", ", member.name, member.id);
+      }
+      slot.leftBehind += fmt::format("{}{} left {} running, which {} ended: {}", slot.leftBehind.empty() ? "" : "; ",
+                                     baseName(slot.commands[slot.item].file()),
+                                     members.size() == 1 ? "a process" : fmt::format("{} processes", members.size()),
+                                     members.size() == 1 ? "was" : "were", names);
+      awaitEndOfGroups(std::span(&slot.group, 1), kKilledSeconds);
+    }
+  }
+  groupEntry(slot).store(0);
+  slot.group = 0;
+}
+
+BatchFailure PosixProcessLauncher::failure(int slot) const {
+  return slotAt(slot).failure;
+}
+
+std::string PosixProcessLauncher::leftBehind(int slot) const {
+  return slotAt(slot).leftBehind;
+}
+
+std::vector<std::string> PosixProcessLauncher::lastOutput(int slot, int lineCount) const {
+  const std::string text = readTail(slotAt(slot).log);
+  const std::vector<std::string_view> lines = splitLines(text);
+  const std::size_t wanted = std::min(lines.size(), static_cast<std::size_t>(std::max(lineCount, 0)));
+  std::vector<std::string> last;
+  for (std::size_t i = lines.size() - wanted; i < lines.size(); ++i) last.push_back(printable(lines[i]));
+  return last;
+}
+
+void PosixProcessLauncher::waitForChange(double seconds) {
+  std::vector<pollfd> watched;
+  for (const Slot& slot : slots_) {
+    if (slot.pidfd < 0) continue;
+    watched.push_back({slot.pidfd, POLLIN, 0});
+    seconds = std::min(seconds, secondsToLook(slot));
+  }
+  if (watched.empty()) return;
+  const double whole = std::floor(std::max(seconds, 0.0));
+  const timespec timeout{static_cast<time_t>(whole), static_cast<long>((std::max(seconds, 0.0) - whole) * 1e9)};
+  ::ppoll(watched.data(), watched.size(), &timeout, nullptr);  // a signal ends the wait, as it should
+}
+
+void PosixProcessLauncher::haltProcesses() {
+  haltGroups();
+  if (guard_) mark_.endBearers();  // without a guard nothing was started
+}
+
+void PosixProcessLauncher::haltGroups() {
+  std::vector<pid_t> running;
+  for (const Slot& slot : slots_) {
+    if (slot.pidfd >= 0) running.push_back(slot.group);
+  }
+  if (running.empty()) return;
+  // The groups' first processes stay unreaped until the end, so that every number means the group that it meant.
+  groups_->signalAll(SIGTERM);
+  awaitEndOfGroups(running, graceSeconds_);
+  groups_->signalAll(SIGKILL);
+  awaitEndOfGroups(running, kKilledSeconds);
+  for (Slot& slot : slots_) {
+    if (slot.pidfd < 0) continue;
+    siginfo_t ignored{};
+    ::waitid(P_PIDFD, static_cast<id_t>(slot.pidfd), &ignored, WEXITED | WNOHANG);
+    ::close(slot.pidfd);
+    slot.pidfd = -1;
+    groupEntry(slot).store(0);
+    slot.failure = {BatchFailure::Kind::signal, SIGTERM,
+                    baseName(slot.commands[slot.item].file()) + " was ended because the run ends"};
+  }
+}
+
+/// The function is one of a library that exists for another system only.
+ResistanceUpdate PosixProcessLauncher::r35UpdateResistanceNumbers(const std::string& fileName) {
+  const std::string extension = std::filesystem::path(fileName).extension().string();
+  return equalIgnoringCase(extension, ".qcsr") ? ResistanceUpdate::libraryNotFound : ResistanceUpdate::wrongExtension;
+}
+
+}  // namespace mirevo

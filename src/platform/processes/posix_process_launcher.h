@@ -1,0 +1,87 @@
+#pragma once
+
+#include <atomic>
+#include <functional>
+#include <memory>
+#include <optional>
+#include <string>
+#include <sys/types.h>
+#include <utility>
+#include <vector>
+
+#include "common/clock.h"
+#include "platform/processes/child_guard.h"
+#include "platform/processes/process_groups.h"
+#include "platform/processes/process_launcher.h"
+#include "platform/processes/process_mark.h"
+#include "platform/processes/spawn_process.h"
+
+namespace mirevo {
+
+/// Runs batches as processes of this machine. A batch's item is a process group of its own; `mirevo_batch.log` in the
+/// slot's folder takes what the batch prints. When an item's first process ends, others of its group that still run are
+/// ended. One that has left its group on purpose (a daemon) may serve later runs. No process of a batch outlives this
+/// program, however it ends.
+class PosixProcessLauncher final : public ProcessLauncher {
+ public:
+  /// Seconds from any origin, never running backwards.
+  using MonotonicClock = std::function<double()>;
+
+  explicit PosixProcessLauncher(MonotonicClock clock = runTimeClock) : clock_(std::move(clock)) {}
+  ~PosixProcessLauncher() override;
+
+  bool initialise(const LauncherSettings& settings) override;
+  const std::string& lastError() const override { return lastError_; }
+  std::string getProcessFolder(int slot) const override;
+  void createProcesses(int slot) override;
+  void isExecuting(int slot, std::int32_t& executing, std::int32_t& status) override;
+  BatchFailure failure(int slot) const override;
+  std::string leftBehind(int slot) const override;
+  std::vector<std::string> lastOutput(int slot, int lineCount) const override;
+  void waitForChange(double seconds) override;
+  void haltProcesses() override;
+  ResistanceUpdate r35UpdateResistanceNumbers(const std::string& fileName) override;
+
+ private:
+  struct Slot {
+    std::string folder;
+    std::vector<SpawnCommand> commands;  ///< one a batch item
+    std::size_t item = 0;                ///< that runs, or ran last
+    int pidfd = -1;                      ///< -1 while nothing runs
+    pid_t group = 0;
+    double started = 0.0;           ///< when the batch began
+    std::optional<double> overdue;  ///< when it was told to end because it ran too long
+    int log = -1;                   ///< open for the whole run, so that a run that prints nothing makes no file
+    BatchFailure failure;
+    std::string leftBehind;
+  };
+
+  Slot& slotAt(int slot) { return slots_.at(static_cast<std::size_t>(slot - 1)); }
+  const Slot& slotAt(int slot) const { return slots_.at(static_cast<std::size_t>(slot - 1)); }
+  void prepareSlot(const LauncherSettings& settings, int number,
+                   const std::vector<std::vector<std::string>>& arguments);
+  void prepareEnvironment(bool useSingleThread);
+  bool renewLog(Slot& slot);
+  void startItem(Slot& slot);
+  void finishItem(Slot& slot, int code, int status);
+  void endOverdue(Slot& slot);
+  double secondsToLook(const Slot& slot) const;
+  void endRestOfGroup(Slot& slot);
+  void haltGroups();
+  void closeDescriptors();
+  std::atomic<pid_t>& groupEntry(const Slot& slot) const;
+
+  std::string lastError_;
+  MonotonicClock clock_;
+  double graceSeconds_ = 0.0;
+  double maxSeconds_ = 0.0;
+  std::vector<Slot> slots_;
+  ProcessMark mark_;
+  std::vector<std::string> environmentTexts_;
+  std::vector<char*> environment_;
+  int nullInput_ = -1;
+  std::unique_ptr<ProcessGroupTable> groups_;
+  std::unique_ptr<ChildGuard> guard_;
+};
+
+}  // namespace mirevo

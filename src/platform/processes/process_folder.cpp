@@ -1,0 +1,249 @@
+#include "platform/processes/process_folder.h"
+
+#include <algorithm>
+#include <array>
+#include <cerrno>
+#include <climits>
+#include <cstring>
+#include <dirent.h>
+#include <fcntl.h>
+#include <filesystem>
+#include <memory>
+#include <optional>
+#include <sys/stat.h>
+#include <unistd.h>
+#include <vector>
+
+#include <fmt/format.h>
+
+#include "common/descriptor.h"
+#include "common/fatal_error.h"
+#include "common/file_copy.h"
+#include "platform/processes/run_made_entries.h"
+
+namespace mirevo {
+namespace {
+
+[[noreturn]] void fail(std::string_view what, const std::string& path, int error) {
+  fatalError(fmt::format("Unable to {} {}: {}", what, path, std::strerror(error)));
+}
+
+/// Whether the error says that something seen a moment ago is gone. Others may be at work where we look: a setup beside
+/// its model has the job's other ranks making their folders, and runs of other setups, in the folder that is copied.
+bool hasVanished(int error) {
+  return error == ENOENT || error == ESTALE;
+}
+
+/// The names in a folder, sorted, without "." and ".."; nothing when there is no such folder.
+std::optional<std::vector<std::string>> namesIn(const std::string& path) {
+  const std::unique_ptr<DIR, int (*)(DIR*)> folder(::opendir(path.c_str()), &::closedir);
+  if (!folder && hasVanished(errno)) return std::nullopt;
+  if (!folder) fail("read the folder", path, errno);
+  std::vector<std::string> names;
+  errno = 0;
+  while (const dirent* entry = ::readdir(folder.get())) {
+    const std::string_view name = entry->d_name;
+    if (name != "." && name != "..") names.emplace_back(name);
+    errno = 0;
+  }
+  if (errno != 0) fail("read the folder", path, errno);
+  std::sort(names.begin(), names.end());
+  return names;
+}
+
+/// Nothing when there is nothing at `path`.
+std::optional<struct stat> statusOf(const std::string& path) {
+  struct stat status {};
+  if (::lstat(path.c_str(), &status) == 0) return status;
+  if (!hasVanished(errno)) fail("look at", path, errno);
+  return std::nullopt;
+}
+
+bool isFolder(const struct stat& status) {
+  return S_ISDIR(status.st_mode);
+}
+
+/// Removes a file, a link, or a folder with all that it holds. Nothing need be there.
+void removeTree(const std::string& root) {
+  // Depth-first with a stack of our own: each folder is met once to empty it and, above its entries, once to remove it.
+  struct Visit {
+    std::string path;
+    bool emptied;
+  };
+  std::vector<Visit> visits;
+  visits.push_back({root, false});
+  while (!visits.empty()) {
+    const Visit visit = visits.back();
+    visits.pop_back();
+    if (visit.emptied) {
+      if (::rmdir(visit.path.c_str()) != 0 && !hasVanished(errno)) fail("remove the folder", visit.path, errno);
+      continue;
+    }
+    const auto status = statusOf(visit.path);
+    if (!status) continue;
+    if (!isFolder(*status)) {
+      if (::unlink(visit.path.c_str()) != 0 && !hasVanished(errno)) fail("remove", visit.path, errno);
+      continue;
+    }
+    ::chmod(visit.path.c_str(), S_IRWXU);  // a model may have made it read-only; a failure shows below
+    visits.push_back({visit.path, true});
+    const auto names = namesIn(visit.path);
+    if (!names) continue;
+    for (const std::string& name : *names) visits.push_back({visit.path + "/" + name, false});
+  }
+}
+
+void copyTimes(int to, const struct stat& status) {
+  const std::array<timespec, 2> times = {status.st_atim, status.st_mtim};
+  ::futimens(to, times.data());  // a copy with other times is still a copy
+}
+
+void copyFile(const std::string& source, const std::string& target, const struct stat& status) {
+  const Descriptor from(::open(source.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW));
+  if (from.get() < 0 && hasVanished(errno)) return;
+  if (from.get() < 0) fail("read", source, errno);
+  Descriptor to(::open(target.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, S_IRUSR | S_IWUSR));
+  if (to.get() < 0) fail("create", target, errno);
+  if (status.st_size > 0 && !copyContent(from.get(), to.get())) {
+    const int error = errno;
+    if (!hasVanished(error)) fail("write", target, error);
+    ::unlink(target.c_str());  // removed on another machine, whose disk this is
+    return;
+  }
+  if (::fchmod(to.get(), status.st_mode & 07777) != 0) fail("set the mode of", target, errno);
+  copyTimes(to.get(), status);
+  if (!to.close()) fail("write", target, errno);
+}
+
+bool liesIn(const std::filesystem::path& path, const std::filesystem::path& folder) {
+  return std::mismatch(folder.begin(), folder.end(), path.begin(), path.end()).first == folder.end();
+}
+
+/// Copies the link `source`, below `sourceRoot`, to `target`.
+void copyLink(const std::string& source, const std::string& target, const std::string& sourceRoot,
+              const std::string& targetRoot) {
+  std::array<char, PATH_MAX> buffer{};
+  const ssize_t length = ::readlink(source.c_str(), buffer.data(), buffer.size());
+  if (length < 0 && hasVanished(errno)) return;
+  if (length < 0) fail("read the link", source, errno);
+  const std::string text(buffer.data(), static_cast<std::size_t>(length));
+  const std::filesystem::path written(text);
+  const auto meant = (std::filesystem::path(source).parent_path() / written).lexically_normal();
+  const bool inside = liesIn(meant, sourceRoot);
+  std::string content = text;
+  if (written.is_absolute() && inside) {
+    content = (std::filesystem::path(targetRoot) / meant.lexically_relative(sourceRoot)).lexically_normal().string();
+  } else if (written.is_relative() && !inside) {
+    content = meant.string();
+  }
+  if (::symlink(content.c_str(), target.c_str()) != 0) fail("create the link", target, errno);
+}
+
+/// The folder in which this run makes its process folders, and how their names begin.
+class ProcessFolderNames final {
+ public:
+  explicit ProcessFolderNames(std::string_view prefix) {
+    const std::size_t slash = prefix.rfind('/');
+    beginning_ = prefix.substr(slash + 1);
+    isKnown_ = ::stat(std::string(prefix.substr(0, slash + 1)).c_str(), &parent_) == 0;
+  }
+
+  /// By the folder's identity, as its path may differ by a link.
+  bool liesIn(const struct stat& folder) const {
+    return isKnown_ && folder.st_dev == parent_.st_dev && folder.st_ino == parent_.st_ino;
+  }
+  bool contains(std::string_view name) const {
+    if (!name.starts_with(beginning_)) return false;
+    name.remove_prefix(beginning_.size());
+    return takeNumber(name) && name.empty();
+  }
+
+ private:
+  std::string_view beginning_;
+  struct stat parent_ {};
+  bool isKnown_ = false;
+};
+
+struct CopiedFolder {
+  std::string target;
+  struct stat status;
+};
+
+/// The copy of the model's own part of a folder, without recursion.
+class FolderCopy final {
+ public:
+  FolderCopy(const std::string& source, const std::string& target, std::string_view processFolderPrefix)
+      : source_(source), target_(target), processFolders_(processFolderPrefix) {}
+
+  void copyAll() {
+    pending_ = {""};  // paths below the root, each with its leading "/"
+    while (!pending_.empty()) {
+      const std::string below = std::move(pending_.back());
+      pending_.pop_back();
+      copyFolder(below);
+    }
+    // A folder is writable while it is filled; its own mode and time follow when everything is in.
+    for (auto folder = made_.rbegin(); folder != made_.rend(); ++folder) {
+      const Descriptor opened(::open(folder->target.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+      if (opened.get() < 0 || ::fchmod(opened.get(), (folder->status.st_mode & 07777) | S_IRWXU) != 0) {
+        fail("set the mode of", folder->target, errno);
+      }
+      copyTimes(opened.get(), folder->status);
+    }
+  }
+
+ private:
+  void copyFolder(const std::string& below) {
+    const std::string from = source_ + below;
+    const std::string to = target_ + below;
+    const auto names = namesIn(from);
+    struct stat status {};
+    if (!names || ::stat(from.c_str(), &status) != 0) {
+      const int error = names ? errno : ENOENT;
+      if (!below.empty() && hasVanished(error)) return;
+      fail("read the folder", from, error);
+    }
+    if (::mkdir(to.c_str(), S_IRWXU) != 0) fail("create the folder", to, errno);
+    made_.push_back({to, status});
+    const bool holdsProcessFolders = processFolders_.liesIn(status);
+    const RunMadeEntries runMade(from, *names);
+    for (const std::string& name : *names) {
+      const bool isBatchLog = below.empty() && name == kBatchLogName;
+      const bool isProcessFolder = holdsProcessFolders && processFolders_.contains(name);
+      if (isBatchLog || isProcessFolder || runMade.contains(name)) continue;
+      std::string path = below;
+      copyEntry(path.append("/").append(name));
+    }
+  }
+
+  void copyEntry(const std::string& path) {
+    const std::string from = source_ + path;
+    const std::string to = target_ + path;
+    const auto status = statusOf(from);
+    if (!status) return;
+    if (isFolder(*status)) {
+      pending_.push_back(path);
+    } else if (S_ISLNK(status->st_mode)) {
+      copyLink(from, to, source_, target_);
+    } else if (S_ISREG(status->st_mode)) {
+      copyFile(from, to, *status);
+    } else if (S_ISFIFO(status->st_mode) && ::mkfifo(to.c_str(), status->st_mode & 07777) != 0) {
+      fail("create", to, errno);
+    }
+  }
+
+  const std::string& source_;
+  const std::string& target_;
+  ProcessFolderNames processFolders_;
+  std::vector<std::string> pending_;
+  std::vector<CopiedFolder> made_;
+};
+
+}  // namespace
+
+void makeProcessFolder(const std::string& source, const std::string& target, std::string_view processFolderPrefix) {
+  removeTree(target);
+  FolderCopy(source, target, processFolderPrefix).copyAll();
+}
+
+}  // namespace mirevo

@@ -1,0 +1,119 @@
+#include "platform/processes/spawn_process.h"
+
+#include <array>
+#include <cerrno>
+#include <climits>
+#include <csignal>
+#include <sched.h>
+#include <sys/prctl.h>
+#include <sys/stat.h>
+#include <sys/syscall.h>
+#include <sys/wait.h>
+#include <unistd.h>
+#include <utility>
+
+namespace mirevo {
+namespace {
+
+constexpr char kShell[] = "/bin/sh";
+
+/// Shared with the child, which runs in our memory: what it is to do, and how far it came.
+struct ChildTask {
+  const SpawnCommand* command = nullptr;
+  const SpawnSurroundings* surroundings = nullptr;
+  pid_t parent = 0;
+  const char* failedStep = nullptr;
+  int error = 0;
+};
+
+[[noreturn]] void giveUp(ChildTask& task, const char* step) {
+  task.error = errno;
+  task.failedStep = step;
+  ::_exit(127);
+}
+
+bool hasRunBit(const char* file) {
+  struct stat status {};
+  return ::stat(file, &status) != 0 || (status.st_mode & (S_IXUSR | S_IXGRP | S_IXOTH)) != 0;
+}
+
+/// Runs in the child. The parent is suspended and all signals are blocked until the command has replaced this program,
+/// so that only system calls may be made here and nothing of the parent's memory but `task` be changed.
+__attribute__((no_sanitize("address", "undefined"))) int runChild(void* argument) {
+  ChildTask& task = *static_cast<ChildTask*>(argument);
+  const SpawnSurroundings& surroundings = *task.surroundings;
+  const char* file = task.command->argv()[0];
+
+  ::setpgid(0, 0);
+  ::prctl(PR_SET_PDEATHSIG, SIGKILL);
+  if (::getppid() != task.parent) ::_exit(127);  // it died before the kernel was asked to watch it
+  surroundings.groupEntry->store(::getpid());
+
+  for (int signal = 1; signal < NSIG; ++signal) ::signal(signal, SIG_DFL);
+  if (::chdir(task.command->folder().c_str()) != 0) giveUp(task, "entered its folder");
+  if (::dup2(surroundings.standardInput, STDIN_FILENO) < 0 || ::dup2(surroundings.standardOutput, STDOUT_FILENO) < 0 ||
+      ::dup2(surroundings.standardOutput, STDERR_FILENO) < 0) {
+    giveUp(task, "given its output");
+  }
+  ::syscall(SYS_close_range, 3U, UINT_MAX, 0U);
+  sigset_t none;
+  ::sigemptyset(&none);
+  ::sigprocmask(SIG_SETMASK, &none, nullptr);
+
+  ::execve(file, task.command->argv(), surroundings.environment);
+  if (errno == ENOEXEC || (errno == EACCES && !hasRunBit(file))) {
+    ::execve(kShell, task.command->shellArgv(), surroundings.environment);
+  }
+  giveUp(task, "started");
+}
+
+}  // namespace
+
+SpawnCommand::SpawnCommand(std::string file, std::string folder, std::vector<std::string> arguments)
+    : file_(std::make_unique<std::string>(std::move(file))),
+      folder_(std::make_unique<std::string>(std::move(folder))),
+      arguments_(std::make_unique<std::vector<std::string>>(std::move(arguments))) {
+  shellArgv_ = {const_cast<char*>(kShell), file_->data()};  // execve does not write to its arguments
+  for (std::string& word : *arguments_) shellArgv_.push_back(word.data());
+  shellArgv_.push_back(nullptr);
+}
+
+// posix_spawn cannot ask for a signal on the parent's death, and fork copies the page tables of a program that may have
+// grown large. So the child is cloned the way posix_spawn does it itself: it borrows this program's memory on a stack
+// of its own while the parent is suspended (CLONE_VM | CLONE_VFORK), which costs the same however large the program is
+// and lets the child report an error by writing it where the parent looks. Unlike vfork, whose child shares the
+// caller's stack frame, a function of its own cannot be upset by what the compiler keeps in that frame. CLONE_PIDFD
+// gives the descriptor to wait on in the same call.
+SpawnedProcess spawnProcess(const SpawnCommand& command, const SpawnSurroundings& surroundings) {
+  alignas(16) static std::array<char, 32768> stack;
+  ChildTask task{&command, &surroundings, ::getpid(), nullptr, 0};
+
+  // No handler of this program may run in the child, whose memory is this program's.
+  sigset_t all;
+  sigset_t before;
+  ::sigfillset(&all);
+  ::sigprocmask(SIG_SETMASK, &all, &before);
+  SpawnedProcess process;
+  process.id = ::clone(&runChild, stack.data() + stack.size(), CLONE_VM | CLONE_VFORK | CLONE_PIDFD | SIGCHLD, &task,
+                       &process.pidfd);
+  const int error = errno;
+  ::sigprocmask(SIG_SETMASK, &before, nullptr);
+
+  if (process.id < 0) {
+    process.error = error;
+    process.failedStep = "started";
+  } else if (task.failedStep != nullptr) {
+    surroundings.groupEntry->store(0);
+    siginfo_t ignored{};
+    while (::waitid(P_PIDFD, static_cast<id_t>(process.pidfd), &ignored, WEXITED) < 0 && errno == EINTR) {
+    }
+    ::close(process.pidfd);
+    process.error = task.error;
+    process.failedStep = task.failedStep;
+    process.pidfd = -1;
+    process.id = -1;
+  }
+  return process;
+}
+
+}  // namespace mirevo

@@ -1,0 +1,224 @@
+#include "platform/series/csv_time_series.h"
+
+#include <algorithm>
+#include <charconv>
+#include <cmath>
+#include <utility>
+
+#include "common/calendar.h"
+#include "common/files.h"
+#include "common/text.h"
+#include "platform/series/csv_cells.h"
+
+namespace mirevo {
+namespace {
+
+constexpr std::string_view kByteOrderMark = "\xEF\xBB\xBF";
+
+/// A cell as a message shows it: in quotes, on one line and not long.
+std::string quoteFound(std::string_view text) {
+  constexpr std::size_t kLongest = 60;
+  std::string shown = "\"";
+  for (const char c : text.substr(0, kLongest)) shown += static_cast<unsigned char>(c) < ' ' ? '?' : c;
+  shown += text.size() > kLongest ? "...\"" : "\"";
+  return shown;
+}
+
+std::string_view viewOf(const char* begin, const char* end) {
+  return {begin, static_cast<std::size_t>(end - begin)};
+}
+
+/// The separator that ends the first cell of the header row, the time column's name: a later one may stand in a name.
+std::optional<char> findSeparator(std::string_view header) {
+  bool quoted = false;
+  for (const char c : header) {
+    if (c == '"') quoted = !quoted;
+    if (!quoted && (c == ',' || c == ';' || c == '\t')) return c;
+  }
+  return std::nullopt;
+}
+
+}  // namespace
+
+bool CsvTimeSeries::open(const std::string& fileName) {
+  std::string reason;
+  std::optional<std::string> content = readTextFile(fileName, reason);
+  if (!content) {
+    clear();
+    lastError_ = fileName + ": " + reason;
+    return false;
+  }
+  return parse(fileName, std::move(*content));
+}
+
+bool CsvTimeSeries::parse(std::string sourceName, std::string content) {
+  clear();
+  sourceName_ = std::move(sourceName);
+  content_ = std::move(content);
+  std::size_t position = content_.starts_with(kByteOrderMark) ? kByteOrderMark.size() : 0;
+  if (readPreamble(position) && readRows(position)) return true;
+  items_.clear();
+  times_.clear();
+  cells_.clear();
+  return false;
+}
+
+void CsvTimeSeries::clear() {
+  content_.clear();
+  lastError_.clear();
+  deleteValue_ = std::numeric_limits<float>::quiet_NaN();
+  items_.clear();
+  times_.clear();
+  cells_.clear();
+  cellsItem_ = 1;
+}
+
+bool CsvTimeSeries::readPreamble(std::size_t& position) {
+  const char* const end = content_.data() + content_.size();
+  while (position < content_.size()) {
+    const char* const begin = content_.data() + position;
+    const char* const lineEnd = csv::endOfLine(begin, end);
+    position = static_cast<std::size_t>(lineEnd - content_.data()) + (lineEnd != end ? 1 : 0);
+    const std::string_view line = viewOf(begin, csv::trimReturn(begin, lineEnd));
+    const std::string_view text = trim(line);
+    if (text.empty()) continue;
+    if (text.front() != '#') return readHeader(line);
+    if (!readMissingMark(text)) return false;
+  }
+  return fail(end, "a header row (the time column's name, then one name an item)", "the end of the file");
+}
+
+bool CsvTimeSeries::readMissingMark(std::string_view line) {
+  std::string_view text = trim(line.substr(1));
+  constexpr std::string_view kKeyword = "missing";
+  if (!equalIgnoringCase(text.substr(0, kKeyword.size()), kKeyword)) return true;
+  text = trim(text.substr(kKeyword.size()));
+  if (text.empty() || text.front() != '=') return true;  // a comment about missing things
+  text = trim(text.substr(1));
+  const std::optional<float> value = csv::parseCell(text.data(), text.data() + text.size());
+  if (!value || text.empty()) {
+    const char* const at = text.empty() ? line.data() + line.size() : text.data();
+    return fail(at, "a number after \"# missing =\"", quoteFound(text));
+  }
+  deleteValue_ = *value;
+  return true;
+}
+
+bool CsvTimeSeries::readHeader(std::string_view line) {
+  const char* const end = line.data() + line.size();
+  const std::optional<char> separator = findSeparator(line);
+  if (!separator) {
+    return fail(line.data(), "a header row with its columns separated by comma, semicolon or tab", quoteFound(line));
+  }
+  separator_ = *separator;
+  const char* cell = line.data();
+  if (csv::DateScanner().scanCell(cell, end)) {
+    return fail(line.data(), "a header row before the first time step", quoteFound(line));
+  }
+  cell = csv::endOfCell(line.data(), end, separator_);
+  while (cell != end) {
+    const char* const begin = cell + 1;
+    cell = csv::endOfCell(begin, end, separator_);
+    items_.push_back({std::string(csv::cellText(begin, cell))});
+  }
+  return true;
+}
+
+bool CsvTimeSeries::readRows(std::size_t position) {
+  const char* const end = content_.data() + content_.size();
+  const char* line = content_.data() + position;
+  hasQuotes_ = std::memchr(line, '"', static_cast<std::size_t>(end - line)) != nullptr;
+  // The first row tells how many there will be; no row is shorter than a day and an empty cell.
+  constexpr std::size_t kShortestRow = 12;
+  const std::size_t rowLength = std::max(kShortestRow, static_cast<std::size_t>(csv::endOfLine(line, end) - line) + 1);
+  times_.reserve((content_.size() - position) / rowLength + 1);
+  cells_.reserve(times_.capacity());
+  csv::DateScanner dates;
+  std::int64_t second = 0;
+  while (line < end) {
+    const char* const next = csv::endOfLine(line, end);
+    const char* const lineEnd = csv::trimReturn(line, next);
+    if (!std::all_of(line, lineEnd, csv::isBlank) && !readRow(line, lineEnd, dates, second)) return false;
+    line = next + 1;
+  }
+  return true;
+}
+
+bool CsvTimeSeries::readRow(const char* line, const char* lineEnd, csv::DateScanner& dates, std::int64_t& second) {
+  const char* at = line;
+  const std::optional<std::int64_t> now = dates.scanCell(at, lineEnd);
+  if (!now || (at != lineEnd && *at != separator_)) {
+    const char* const cellEnd = csv::endOfCell(line, lineEnd, separator_);
+    return fail(line, "a valid time like 2001-01-31 12:30", quoteFound(csv::cellText(line, cellEnd)));
+  }
+  if (!times_.empty() && *now <= second) {
+    return fail(line, "a time later than " + formatDate(dateOfSecond(second)), formatDate(dateOfSecond(*now)));
+  }
+  if (times_.empty()) startSecond_ = *now;
+  second = *now;
+  const int cellCount = csv::countSeparators(at, lineEnd, separator_, hasQuotes_);
+  if (cellCount != itemCount()) {
+    return fail(line, std::to_string(items_.size() + 1) + " columns as in the header row",
+                std::to_string(cellCount + 1));
+  }
+  times_.push_back(static_cast<double>(second - startSecond_) / 86400.0);
+  cells_.push_back(static_cast<std::size_t>(at + 1 - content_.data()));
+  return true;
+}
+
+void CsvTimeSeries::moveToItem(int item) {
+  if (item == cellsItem_) return;
+  const char* const begin = content_.data();
+  const char* const end = begin + content_.size();
+  for (std::size_t& position : cells_) {
+    const char* cell = begin + position;
+    for (int i = cellsItem_; i < item; ++i) cell = csv::endOfCell(cell, end, separator_) + 1;
+    for (int i = cellsItem_; i > item; --i) cell = csv::previousCell(cell, separator_);
+    position = static_cast<std::size_t>(cell - begin);
+  }
+  cellsItem_ = item;
+}
+
+bool CsvTimeSeries::readItem(std::size_t place) {
+  std::vector<float>& values = items_[place].values;
+  moveToItem(static_cast<int>(place) + 1);
+  values.reserve(times_.size());
+  const char* const begin = content_.data();
+  const char* const end = begin + content_.size();
+  const auto endsCell = [&](const char* at) {
+    return at == end || *at == separator_ || *at == '\n' || (*at == '\r' && (at + 1 == end || at[1] == '\n'));
+  };
+  for (const std::size_t position : cells_) {
+    const char* const cell = begin + position;
+    float value = 0.0F;
+    const auto [stop, error] = std::from_chars(cell, end, value);
+    if (error == std::errc{} && endsCell(stop) && std::isfinite(value)) {
+      values.push_back(value);
+      continue;
+    }
+    const char* const lineEnd = csv::trimReturn(cell, csv::endOfLine(cell, end));
+    const char* const cellEnd = csv::endOfCell(cell, lineEnd, separator_);
+    const std::optional<float> slow = csv::parseCell(cell, cellEnd);
+    if (!slow) {
+      values.clear();
+      return fail(cell, "a number of at most 3.4028235e38 in size, an empty cell, NaN or NA",
+                  quoteFound(csv::cellText(cell, cellEnd)));
+    }
+    values.push_back(*slow);
+  }
+  return true;
+}
+
+bool CsvTimeSeries::fail(const char* at, std::string_view expected, std::string_view found) {
+  const char* const begin = content_.data();
+  const auto line = std::count(begin, at, '\n') + 1;
+  const char* lineBegin = at;
+  while (lineBegin != begin && lineBegin[-1] != '\n') --lineBegin;
+  lastError_ = sourceName_ + ":" + std::to_string(line) + ":" + std::to_string(at - lineBegin + 1) + ": expected ";
+  lastError_ += expected;
+  lastError_ += ", found ";
+  lastError_ += found;
+  return false;
+}
+
+}  // namespace mirevo

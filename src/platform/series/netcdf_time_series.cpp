@@ -1,0 +1,301 @@
+#include "platform/series/netcdf_time_series.h"
+
+#include <cmath>
+#include <limits>
+#include <optional>
+#include <string_view>
+
+#include <fmt/format.h>
+#include <netcdf.h>
+
+#include "common/calendar.h"
+#include "common/files.h"
+#include "common/text.h"
+#include "platform/series/netcdf_classic.h"
+#include "platform/series/netcdf_units.h"
+
+namespace mirevo {
+namespace {
+
+constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
+constexpr std::size_t kMostSteps = std::size_t{1} << 27;  // a damaged header must not ask for all memory
+constexpr std::size_t kMostItems = 1'000'000;
+
+/// A variable's name, type and dimensions, with their lengths.
+struct Variable {
+  std::string name;
+  nc_type type = NC_NAT;
+  std::vector<int> dimensions;
+  std::vector<std::size_t> lengths;
+};
+
+std::optional<Variable> inquireVariable(int file, int variable) {
+  char name[NC_MAX_NAME + 1] = {};
+  int dimensionCount = 0;
+  Variable result;
+  if (nc_inq_var(file, variable, name, &result.type, &dimensionCount, nullptr, nullptr) != NC_NOERR)
+    return std::nullopt;
+  result.name = name;
+  result.dimensions.resize(static_cast<std::size_t>(dimensionCount));
+  if (nc_inq_vardimid(file, variable, result.dimensions.data()) != NC_NOERR) return std::nullopt;
+  for (const int dimension : result.dimensions) {
+    std::size_t length = 0;
+    if (nc_inq_dimlen(file, dimension, &length) != NC_NOERR) return std::nullopt;
+    result.lengths.push_back(length);
+  }
+  return result;
+}
+
+bool isNumeric(nc_type type) {
+  return type == NC_BYTE || type == NC_UBYTE || type == NC_SHORT || type == NC_USHORT || type == NC_INT ||
+         type == NC_UINT || type == NC_INT64 || type == NC_UINT64 || type == NC_FLOAT || type == NC_DOUBLE;
+}
+
+/// A text attribute of either kind of text; empty when there is none.
+std::string textAttribute(int file, int variable, const char* name) {
+  nc_type type = NC_NAT;
+  std::size_t length = 0;
+  if (nc_inq_att(file, variable, name, &type, &length) != NC_NOERR || length == 0) return {};
+  if (type == NC_CHAR) {
+    std::string text(length, '\0');
+    if (nc_get_att_text(file, variable, name, text.data()) != NC_NOERR) return {};
+    return text.substr(0, text.find('\0'));
+  }
+  if (type != NC_STRING) return {};
+  std::vector<char*> texts(length, nullptr);
+  if (nc_get_att_string(file, variable, name, texts.data()) != NC_NOERR) return {};
+  std::string text = texts.front() != nullptr ? texts.front() : "";
+  nc_free_string(length, texts.data());
+  return text;
+}
+
+/// The first number of a numeric attribute.
+std::optional<double> numberAttribute(int file, int variable, const char* name) {
+  nc_type type = NC_NAT;
+  std::size_t length = 0;
+  if (nc_inq_att(file, variable, name, &type, &length) != NC_NOERR || length == 0 || !isNumeric(type)) {
+    return std::nullopt;
+  }
+  std::vector<double> numbers(length);
+  if (nc_get_att_double(file, variable, name, numbers.data()) != NC_NOERR) return std::nullopt;
+  return numbers.front();
+}
+
+/// What the library fills unwritten values with: a model that stopped half-way leaves them. Bytes have no such value.
+std::optional<double> defaultFill(nc_type type) {
+  switch (type) {
+    case NC_SHORT:
+      return NC_FILL_SHORT;
+    case NC_USHORT:
+      return NC_FILL_USHORT;
+    case NC_INT:
+      return NC_FILL_INT;
+    case NC_UINT:
+      return NC_FILL_UINT;
+    case NC_INT64:
+      return static_cast<double>(NC_FILL_INT64);
+    case NC_UINT64:
+      return static_cast<double>(NC_FILL_UINT64);
+    case NC_FLOAT:
+      return static_cast<double>(NC_FILL_FLOAT);
+    case NC_DOUBLE:
+      return NC_FILL_DOUBLE;
+    default:
+      return std::nullopt;
+  }
+}
+
+/// How a variable's stored numbers become values.
+struct Unpacking {
+  double fill = kNaN;     ///< NaN: none
+  double missing = kNaN;  ///< NaN: none
+  double scale = 1.0;
+  double offset = 0.0;
+
+  /// NaN for a stored number that marks a gap.
+  double operator()(double stored) const {
+    if (stored == fill || stored == missing) return kNaN;
+    return stored * scale + offset;
+  }
+};
+
+Unpacking unpackingOf(int file, int variable, nc_type type) {
+  Unpacking unpacking;
+  unpacking.fill = numberAttribute(file, variable, "_FillValue").value_or(defaultFill(type).value_or(kNaN));
+  unpacking.missing = numberAttribute(file, variable, "missing_value").value_or(kNaN);
+  unpacking.scale = numberAttribute(file, variable, "scale_factor").value_or(1.0);
+  unpacking.offset = numberAttribute(file, variable, "add_offset").value_or(0.0);
+  return unpacking;
+}
+
+}  // namespace
+
+NetcdfTimeSeries::~NetcdfTimeSeries() {
+  close();
+}
+
+void NetcdfTimeSeries::close() {
+  if (file_ >= 0) nc_close(file_);
+  file_ = -1;
+  timeDimension_ = -1;
+  times_.clear();
+  items_.clear();
+  places_.clear();
+}
+
+bool NetcdfTimeSeries::fail(const std::string& what) {
+  lastError_ = fileName_ + ": " + what;
+  return false;
+}
+
+bool NetcdfTimeSeries::succeeded(int status, const std::string& what) {
+  return status == NC_NOERR || fail(what + ": " + nc_strerror(status));
+}
+
+bool NetcdfTimeSeries::open(const std::string& fileName) {
+  close();
+  lastError_.clear();
+  fileName_ = fileName;
+  if (const std::string fault = faultOfFile(fileName); !fault.empty()) return fail("opening: " + fault);
+  if (const auto cutOff = findCutOff(fileName)) return fail(*cutOff);
+  int timeVariable = -1;
+  if (succeeded(nc_open(fileName.c_str(), NC_NOWRITE, &file_), "opening") && findTimeVariable(timeVariable) &&
+      readTimes(timeVariable) && findItems(timeVariable)) {
+    return true;
+  }
+  close();
+  return false;
+}
+
+bool NetcdfTimeSeries::findTimeVariable(int& timeVariable) {
+  int variableCount = 0;
+  if (!succeeded(nc_inq_nvars(file_, &variableCount), "reading the variables")) return false;
+  timeVariable = -1;
+  for (int id = 0; id < variableCount; ++id) {
+    const std::optional<Variable> variable = inquireVariable(file_, id);
+    if (!variable || variable->dimensions.size() != 1 || !isNumeric(variable->type)) continue;
+    if (toLowerAscii(textAttribute(file_, id, "units")).find(" since ") == std::string::npos) continue;
+    char dimensionName[NC_MAX_NAME + 1] = {};
+    if (!succeeded(nc_inq_dimname(file_, variable->dimensions[0], dimensionName), "reading a dimension")) return false;
+    const bool isCoordinate = variable->name == dimensionName;
+    if (timeVariable >= 0 && !isCoordinate) continue;
+    timeVariable = id;
+    timeDimension_ = variable->dimensions[0];
+    if (isCoordinate) break;
+  }
+  if (timeVariable >= 0) return true;
+  return fail("expected a time variable over one dimension with units like \"hours since 1990-01-01\", found none");
+}
+
+bool NetcdfTimeSeries::readTimes(int timeVariable) {
+  const std::optional<Variable> variable = inquireVariable(file_, timeVariable);
+  if (!variable) return fail("the time variable cannot be read");
+  const std::string where = "variable \"" + variable->name + "\"";
+  const std::size_t count = variable->lengths[0];
+  if (count > kMostSteps) return fail(fmt::format("{}: expected at most {} steps, found {}", where, kMostSteps, count));
+  std::string reason;
+  const std::optional<TimeUnits> units = parseTimeUnits(textAttribute(file_, timeVariable, "units"),
+                                                        textAttribute(file_, timeVariable, "calendar"), reason);
+  if (!units) return fail(where + ": " + reason);
+  std::vector<double> stored(count);
+  if (!succeeded(nc_get_var_double(file_, timeVariable, stored.data()), "reading " + where)) return false;
+  const Unpacking unpack = unpackingOf(file_, timeVariable, variable->type);
+  const auto earliest = static_cast<double>(secondNumber({0, 1, 1}));
+  const auto latest = static_cast<double>(secondNumber({9999, 12, 31}));
+  double first = 0.0;
+  double firstFraction = 0.0;  // of a second, after the start time
+  for (std::size_t step = 0; step < count; ++step) {
+    const double seconds = unpack(stored[step]) * units->secondsPerUnit;
+    const double absolute = static_cast<double>(units->originSecond) + seconds;
+    if (!(absolute >= earliest && absolute <= latest)) {
+      return fail(fmt::format("{}, step {}: expected a time, found {}", where, step + 1, formatReal(stored[step])));
+    }
+    if (step == 0) {
+      first = seconds;
+      // To the millisecond: a time in days need not be a whole second in 64 bits.
+      const double milliseconds = std::round(seconds * 1000.0);
+      startSecond_ = units->originSecond + static_cast<std::int64_t>(std::floor(milliseconds / 1000.0));
+      firstFraction = (milliseconds - std::floor(milliseconds / 1000.0) * 1000.0) / 1000.0;
+    }
+    const double days = (seconds - first + firstFraction) / 86400.0;
+    if (step > 0 && !(days > times_.back())) {
+      return fail(fmt::format("{}, step {}: expected a time later than {}, found {}", where, step + 1,
+                              formatReal(stored[step - 1]), formatReal(stored[step])));
+    }
+    times_.push_back(days);
+  }
+  return true;
+}
+
+bool NetcdfTimeSeries::findItems(int timeVariable) {
+  int variableCount = 0;
+  if (!succeeded(nc_inq_nvars(file_, &variableCount), "reading the variables")) return false;
+  const std::string bounds = textAttribute(file_, timeVariable, "bounds");
+  for (int id = 0; id < variableCount; ++id) {
+    const std::optional<Variable> variable = inquireVariable(file_, id);
+    if (id == timeVariable || !variable || !isNumeric(variable->type) || variable->name == bounds) continue;
+    Place place;
+    place.variable = id;
+    place.dimensionCount = static_cast<int>(variable->dimensions.size());
+    place.timePosition = -1;
+    int longDimensions = 0;
+    std::size_t stations = 1;
+    for (int position = 0; position < place.dimensionCount; ++position) {
+      const auto p = static_cast<std::size_t>(position);
+      if (place.timePosition < 0 && variable->dimensions[p] == timeDimension_) {
+        place.timePosition = position;
+      } else if (variable->lengths[p] != 1) {
+        ++longDimensions;
+        place.stationPosition = position;
+        stations = variable->lengths[p];
+      }
+    }
+    // A grid over time is no table of stations: it has no items.
+    if (place.timePosition < 0 || longDimensions > 1) continue;
+    if (items_.size() + stations > kMostItems) {
+      return fail(fmt::format("expected at most {} items, found more at variable \"{}\"", kMostItems, variable->name));
+    }
+    for (place.station = 0; place.station < stations; ++place.station) {
+      places_.push_back(place);
+      items_.push_back({variable->name});
+      if (place.stationPosition >= 0) items_.back().name += fmt::format("[{}]", place.station + 1);
+    }
+  }
+  return true;
+}
+
+std::optional<float> NetcdfTimeSeries::deleteValue() const {
+  return std::numeric_limits<float>::quiet_NaN();
+}
+
+bool NetcdfTimeSeries::readItem(std::size_t place) {
+  Item& item = items_[place];
+  const Place& at = places_[place];
+  const std::string where = "variable \"" + item.name + "\"";
+  nc_type type = NC_NAT;
+  if (!succeeded(nc_inq_vartype(file_, at.variable, &type), "reading " + where)) return false;
+  std::vector<std::size_t> start(static_cast<std::size_t>(at.dimensionCount), 0);
+  std::vector<std::size_t> count(start.size(), 1);
+  count[static_cast<std::size_t>(at.timePosition)] = times_.size();
+  if (at.stationPosition >= 0) start[static_cast<std::size_t>(at.stationPosition)] = at.station;
+  std::vector<double> stored(times_.size());
+  if (!succeeded(nc_get_vara_double(file_, at.variable, start.data(), count.data(), stored.data()),
+                 "reading " + where)) {
+    return false;
+  }
+  const Unpacking unpack = unpackingOf(file_, at.variable, type);
+  std::vector<float> values;
+  values.reserve(stored.size());
+  for (std::size_t step = 0; step < stored.size(); ++step) {
+    const double value = unpack(stored[step]);
+    values.push_back(static_cast<float>(value));
+    if (std::isinf(values.back())) {
+      return fail(fmt::format("{}, step {}: expected a number of at most 3.4028235e38 in size, found {}", where,
+                              step + 1, formatReal(value)));
+    }
+  }
+  item.values = std::move(values);
+  return true;
+}
+
+}  // namespace mirevo

@@ -1,0 +1,51 @@
+#pragma once
+
+#include <cstdint>
+#include <string>
+#include <vector>
+
+#include "platform/series/stored_time_series.h"
+
+namespace mirevo {
+
+/// A CF NetCDF file, read through netCDF-C. Its time variable is the one over a single dimension whose `units` are
+/// "days|hours|minutes|seconds since DATE" (the one named like its dimension where there are several). Items are the
+/// numeric variables over the time dimension, in file order; where a variable has one more dimension that is longer
+/// than 1 (stations), each index of that is an item. `scale_factor` and `add_offset` are applied.
+class NetcdfTimeSeries final : public StoredTimeSeries {
+ public:
+  NetcdfTimeSeries() = default;
+  ~NetcdfTimeSeries() override;
+
+  bool open(const std::string& fileName) override;
+  /// NaN: every variable may have a marker of its own (`_FillValue`, `missing_value`, the library's default fill), so
+  /// all of them become NaN among the values.
+  std::optional<float> deleteValue() const override;
+
+ private:
+  bool readItem(std::size_t place) override;
+  const std::string& sourceName() const override { return fileName_; }
+  /// Where an item's values stand in the file.
+  struct Place {
+    int variable = 0;
+    int timePosition = 0;  ///< which of the variable's dimensions is the time
+    int dimensionCount = 1;
+    int stationPosition = -1;  ///< which of them is the station; -1: none
+    std::size_t station = 0;   ///< index along it
+  };
+
+  void close();
+  bool findTimeVariable(int& timeVariable);
+  bool readTimes(int timeVariable);
+  bool findItems(int timeVariable);
+  bool fail(const std::string& what);
+  /// Whether a call of the library succeeded; keeps "file: what: the library's message" if not.
+  bool succeeded(int status, const std::string& what);
+
+  int file_ = -1;  ///< the library's handle; -1: not open
+  int timeDimension_ = -1;
+  std::string fileName_;
+  std::vector<Place> places_;  ///< one an item
+};
+
+}  // namespace mirevo

@@ -1,0 +1,45 @@
+#pragma once
+
+#include <cstdint>
+#include <string>
+#include <vector>
+
+#include "platform/series/time_series_object.h"
+
+namespace mirevo {
+
+/// What the kinds of series files have in common: a time axis and items in memory, which a kind's open() fills and its
+/// readItem() completes.
+class StoredTimeSeries : public TimeSeriesObject {
+ public:
+  const std::string& lastError() const final { return lastError_; }
+  std::optional<DateRecord> startTime() const final;
+  int itemCount() const final { return static_cast<int>(items_.size()); }
+  std::string itemName(int item) const final;
+  bool getData(int item) final;
+  int timeStepCount() const final { return static_cast<int>(times_.size()); }
+  std::span<const double> times() const final { return times_; }
+  std::span<const float> values(int item) const final;
+
+ protected:
+  struct Item {
+    std::string name;
+    std::vector<float> values = {};  ///< one a time step; empty until getData()
+  };
+
+  /// Fills in the values of an item, given by its 0-based place; false, with lastError_ said and no value left, when
+  /// they cannot be read.
+  virtual bool readItem(std::size_t place) = 0;
+  /// Whose items they are, for messages.
+  virtual const std::string& sourceName() const = 0;
+
+  std::string lastError_;
+  std::int64_t startSecond_ = 0;  ///< of the first step, whole seconds
+  std::vector<double> times_;     ///< days since startSecond_
+  std::vector<Item> items_;
+
+ private:
+  bool hasItem(int item) const { return item >= 1 && item <= itemCount(); }
+};
+
+}  // namespace mirevo

@@ -1,0 +1,93 @@
+#include "platform/series/time_series_object.h"
+
+#include <algorithm>
+#include <filesystem>
+
+#include "common/text.h"
+#include "platform/series/csv_time_series.h"
+#include "platform/series/netcdf_time_series.h"
+
+namespace mirevo {
+namespace {
+
+/// Index of the first step not earlier than `days`, counting steps within half a millisecond as at `days`; the number
+/// of steps when there is none. Widens its search from `hint` in doubling strides.
+std::size_t firstStepFrom(std::span<const double> times, double days, std::size_t hint) {
+  const double from = days - kSameTimeDays;
+  std::size_t low = std::min(hint, times.size());
+  std::size_t high = low;
+  std::size_t stride = 1;
+  if (low < times.size() && times[low] < from) {
+    while (high < times.size() && times[high] < from) {
+      low = high + 1;
+      high = std::min(times.size(), high + stride);
+      stride *= 2;
+    }
+  } else {
+    while (low > 0 && !(times[low - 1] < from)) {
+      high = low - 1;
+      low -= std::min(low, stride);
+      stride *= 2;
+    }
+  }
+  const auto first = times.begin();
+  return static_cast<std::size_t>(std::lower_bound(first + low, first + high, from) - first);
+}
+
+/// The value of the item in the period that no other `precedes`.
+template <typename Precedes>
+std::optional<float> extractValue(const TimeSeriesObject& series, int item, double start, double end,
+                                  Precedes precedes) {
+  const std::span<const double> times = series.times();
+  const std::span<const float> values = series.values(item);
+  const std::optional<float> deleteValue = series.deleteValue();
+  const std::size_t count = std::min(times.size(), values.size());
+  std::optional<float> extreme;
+  for (std::size_t step = firstStepFrom(times, start, 0); step < count && times[step] <= end + kSameTimeDays; ++step) {
+    if (isMissing(values[step], deleteValue)) continue;
+    if (!extreme || precedes(values[step], *extreme)) extreme = values[step];
+  }
+  return extreme;
+}
+
+}  // namespace
+
+std::unique_ptr<TimeSeriesObject> createTimeSeriesObject(const std::string& fileName, std::string& reason) {
+  const std::string ending = toLowerAscii(std::filesystem::path(trimTrailing(fileName)).extension().string());
+  if (ending == ".csv" || ending == ".txt" || ending == ".tsv") return std::make_unique<CsvTimeSeries>();
+  if (ending == ".nc") return std::make_unique<NetcdfTimeSeries>();
+  reason = "expected a time-series file name ending in .csv, .txt, .tsv or .nc, found " +
+           (ending.empty() ? std::string("no ending") : "\"" + ending + "\"");
+  return nullptr;
+}
+
+std::optional<float> valueAt(const TimeSeriesObject& series, int item, double days, std::size_t& hint) {
+  const std::span<const double> times = series.times();
+  const std::span<const float> values = series.values(item);
+  const std::optional<float> deleteValue = series.deleteValue();
+  const std::size_t next = firstStepFrom(times, days, hint);
+  hint = next;
+  if (next >= std::min(times.size(), values.size())) return std::nullopt;
+  const float nextValue = values[next];
+  if (isMissing(nextValue, deleteValue)) return std::nullopt;
+  if (times[next] <= days + kSameTimeDays) return nextValue;
+  if (next == 0 || isMissing(values[next - 1], deleteValue)) return std::nullopt;
+  const double before = values[next - 1];
+  const double fraction = (days - times[next - 1]) / (times[next] - times[next - 1]);
+  return static_cast<float>(before + fraction * (static_cast<double>(nextValue) - before));
+}
+
+std::optional<float> valueAt(const TimeSeriesObject& series, int item, double days) {
+  std::size_t hint = 0;
+  return valueAt(series, item, days, hint);
+}
+
+std::optional<float> extractMaxValue(const TimeSeriesObject& series, int item, double start, double end) {
+  return extractValue(series, item, start, end, [](float a, float b) { return a > b; });
+}
+
+std::optional<float> extractMinValue(const TimeSeriesObject& series, int item, double start, double end) {
+  return extractValue(series, item, start, end, [](float a, float b) { return a < b; });
+}
+
+}  // namespace mirevo

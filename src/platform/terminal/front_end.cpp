@@ -1,0 +1,48 @@
+#include "platform/terminal/front_end.h"
+
+#include <cstdlib>
+#include <filesystem>
+#include <unistd.h>
+
+#include "common/descriptor_output.h"
+#include "platform/terminal/terminal.h"
+
+namespace mirevo {
+namespace {
+
+constexpr int kPatienceMilliseconds = 1000;
+
+/// ECMA-48: red, yellow, or none.
+std::string_view colourOf(MessageType type) {
+  if (type == MessageType::error) return "\x1b[31m";
+  return type == MessageType::warning ? "\x1b[33m" : "";
+}
+
+}  // namespace
+
+MessageResult showMessage(std::string_view text, std::string_view title, MessageType type) {
+  std::string shown = title.empty() ? programName() : std::string(title);
+  const std::string_view colour = colourOf(type);
+  if (!colour.empty() && ::isatty(STDERR_FILENO) == 1 && wantsColour()) {
+    shown.insert(0, colour);
+    shown += "\x1b[0m";
+  }
+  shown.append(": ").append(text).append("\n");
+  return writeWhole(STDERR_FILENO, shown, kPatienceMilliseconds).error == 0 ? MessageResult::ok
+                                                                            : MessageResult::notShown;
+}
+
+bool isUnattended() {
+  const char* mode = std::getenv("BUILDMODE");
+  return mode != nullptr && std::string_view(mode) == "NIGHT";
+}
+
+std::string programName() {
+  return std::filesystem::path(::program_invocation_short_name).stem().string();
+}
+
+void qmonExit(int exitCode) {
+  std::exit(exitCode);
+}
+
+}  // namespace mirevo

@@ -1,0 +1,28 @@
+#pragma once
+
+#include <cstddef>
+#include <optional>
+#include <span>
+#include <string>
+#include <vector>
+
+#include "parameters/search_space.h"
+#include "report/report_data.h"
+#include "run/results/result_table.h"
+#include "run/setup/run_config.h"
+
+namespace mirevo {
+
+/// The names of all measures that compare the same pair of series as the one of that 0-based number, with commas.
+std::string pairName(std::span<const OutputMeasure> measures, std::size_t measure);
+
+/// The bands that a finished uncertainty analysis has written beside its results, one a pair of series; those that
+/// cannot be read are left out.
+std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::string& filePrefix);
+
+/// What a local sensitivity analysis found, computed again from its rows; nothing while the run with the initial values
+/// is not there.
+std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, const SearchSpace& space,
+                                                       const ResultTable& results);
+
+}  // namespace mirevo

@@ -1,0 +1,66 @@
+#include "report/report_program.h"
+
+#include <exception>
+#include <string_view>
+
+#include <fmt/format.h>
+
+#include "common/fatal_error.h"
+#include "common/version.h"
+#include "platform/terminal/front_end.h"
+#include "report/run_report.h"
+#include "run/setup/setup_reader.h"
+
+namespace mirevo {
+namespace {
+
+constexpr std::string_view kUsage = "Usage: mirevo-report kdx-file";
+
+constexpr std::string_view kHelp = R"(
+Writes <setup>_Report.html, a report for the browser, from what the run of the setup has written so far. The run may go
+on meanwhile, may have ended in any way or have been cut off; its files are only read.
+
+  --version   prints the version
+  --help      prints this text
+)";
+
+int makeReport(const std::string& setupFileName) {
+  RunLog unread;  // the run's own log is not touched
+  const RunConfig config = readSetupFile(setupFileName, unread);
+  const std::string filePrefix = config.setupFolder + "/" + config.setupName;
+  std::string reason;
+  if (!writeReport(config, filePrefix, std::nullopt, reason)) {
+    showMessage("Error: Unable to write the report of " + setupFileName + "\n" + reason);
+    return 1;
+  }
+  fmt::print("{}\n", reportPath(filePrefix));
+  return 0;
+}
+
+}  // namespace
+
+int reportProgram(std::span<const std::string> arguments) {
+  const std::string_view argument = arguments.size() == 1 ? std::string_view(arguments.front()) : std::string_view();
+  if (argument == "--help") {
+    fmt::print("{}\n{}", kUsage, kHelp);
+    return 0;
+  }
+  if (argument == "--version") {
+    fmt::print("mirevo-report {}\n", programVersion());
+    return 0;
+  }
+  if (argument.empty() || argument.starts_with("--")) {
+    showMessage(kUsage);
+    return 1;
+  }
+  try {
+    return makeReport(arguments.front());
+  } catch (const FatalError& error) {
+    showMessage(error.message() + "\n" + error.detail());
+  } catch (const std::exception& error) {
+    showMessage(std::string("Error: Unexpected failure\n") + error.what());
+  }
+  return 1;
+}
+
+}  // namespace mirevo

@@ -1,0 +1,194 @@
+#include "run/progress/progress_reporter.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <cstring>
+#include <fcntl.h>
+#include <unistd.h>
+#include <utility>
+
+#include <fmt/format.h>
+
+#include "common/descriptor_output.h"
+#include "common/text.h"
+#include "platform/signals/signal_state.h"
+
+namespace mirevo {
+namespace {
+
+constexpr int kNowhere = -1;
+constexpr int kStandardOutput = 0;
+constexpr std::string_view kMessageFileEnding = "._spi_";
+constexpr std::string_view kKillFileEnding = "._kill_";
+constexpr std::size_t kSpeedWindow = 100;  ///< evaluations
+/// For a pipe or terminal to take a record. One that took none in that time is not waited for until it takes one again,
+/// so that a reader who has stopped reading does not slow the run.
+constexpr int kPatienceMilliseconds = 1000;
+
+std::string baseNameOf(std::string_view runFileName) {
+  for (const std::string_view ending : {".log", ".inp"}) {
+    if (!runFileName.ends_with(ending)) continue;
+    runFileName.remove_suffix(ending.size());
+    break;  // what is left may be called "basin.inp"
+  }
+  return std::string(runFileName);
+}
+
+}  // namespace
+
+ProgressReporter::ProgressReporter(Clock clock) : clock_(std::move(clock)) {}
+
+ProgressReporter::~ProgressReporter() {
+  closeMessageFile();
+}
+
+bool ProgressReporter::closeMessageFile() {
+  const int descriptor = std::exchange(messageUnit_, kNowhere);
+  if (descriptor <= kStandardOutput) return true;
+  signalState.messageFileDescriptor = -1;
+  return ::close(descriptor) == 0;
+}
+
+std::string ProgressReporter::progressInit(std::string_view runFileName, std::string_view destination) {
+  baseName_ = baseNameOf(runFileName);
+  std::string problems;
+  const std::string killFile = baseName_ + std::string(kKillFileEnding);
+  if (::unlink(killFile.c_str()) != 0 && errno != ENOENT) {
+    problems = fmt::format("Unable to remove the kill file of an earlier run: {}: {}", killFile, std::strerror(errno));
+  }
+  if (destination == "NONE") {
+    messageUnit_ = kNowhere;
+  } else if (destination == "STDOUT") {
+    messageUnit_ = kStandardOutput;
+  } else {
+    // Without O_NONBLOCK the opening of a pipe would wait for its reader.
+    messageUnit_ =
+        ::open(messageFile().c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_APPEND | O_CLOEXEC | O_NONBLOCK, 0666);
+    if (messageUnit_ >= 0) {
+      signalState.messageFileDescriptor = messageUnit_;
+    } else {
+      if (!problems.empty()) problems += '\n';
+      problems += fmt::format("Unable to open TqQmon2 message file: {}: {}", messageFile(), std::strerror(errno));
+    }
+  }
+  return problems;
+}
+
+void ProgressReporter::writeRecord(std::string_view kind, std::string_view text) {
+  if (messageUnit_ < 0) return;
+  std::string record;
+  if (messageUnit_ == kStandardOutput) {
+    if (kind != "MESSAG") return;
+    record = " ";  // list-directed output begins with a blank
+  } else {
+    record = kind;
+  }
+  record += text;
+  std::replace_if(
+      record.begin(), record.end(), [](char c) { return c == '\n' || c == '\r'; }, ' ');
+  record += '\n';
+  if (isLineUnfinished_) record.insert(record.begin(), '\n');
+  const int descriptor = messageUnit_ == kStandardOutput ? STDOUT_FILENO : messageUnit_;
+  // One write(2), so that a viewer that reads along never sees half a record of an ordinary disk file.
+  const OutputResult result = writeWhole(descriptor, record, isReaderBusy_ ? 0 : kPatienceMilliseconds);
+  isReaderBusy_ = result.error == EAGAIN;  // the record is lost
+  if (result.taken > 0) isLineUnfinished_ = result.taken < record.size();
+  // A full disk or a closed pipe ends the reporting and not the run.
+  if (result.error != 0 && !isReaderBusy_) giveUp(result.error);
+}
+
+/// A full disk or a closed pipe ends the reporting and not the run.
+void ProgressReporter::giveUp(int error) {
+  const std::string name = messageUnit_ == kStandardOutput ? "standard output" : messageFile();
+  problem_ = fmt::format("Progress is no longer reported: unable to write to {}: {}", name, std::strerror(error));
+  closeMessageFile();
+}
+
+std::string ProgressReporter::messageFile() const {
+  return baseName_ + std::string(kMessageFileEnding);
+}
+
+void ProgressReporter::writeStatus(std::string_view text) {
+  writeRecord("STATUS", text);
+}
+void ProgressReporter::writeStatusLabel(std::string_view text) {
+  writeRecord("STALBL", text);
+}
+void ProgressReporter::writeMessage(std::string_view text) {
+  writeRecord("MESSAG", text);
+}
+void ProgressReporter::writeMessageLabel(std::string_view text) {
+  writeRecord("MESLBL", text);
+}
+void ProgressReporter::writeSpeed(std::string_view text) {
+  writeRecord("COMSPD", text);
+}
+void ProgressReporter::writeTimeLeft(std::string_view text) {
+  writeRecord("TIMLFT", text);
+}
+void ProgressReporter::writeProgress(std::string_view text) {
+  writeRecord("PROGRE", text);
+}
+
+void ProgressReporter::progressStart(std::string_view origin) {
+  writeStatus("Initialisation");
+  writeMessage(fmt::format("Run started {}", origin));
+  writeProgress("0.0");
+}
+
+void ProgressReporter::progressEvaluationLabel(int plannedEvaluations) {
+  plannedEvaluations_ = plannedEvaluations;
+  completedEvaluations_ = 0;
+  times_.assign(1, clock_());
+  writeStatusLabel("Model evaluation");
+  writeMessageLabel(withNumber(" of %", plannedEvaluations));
+}
+
+void ProgressReporter::progressStep() {
+  ++completedEvaluations_;
+  times_.push_back(clock_());
+  if (times_.size() > kSpeedWindow + 1) times_.pop_front();
+  const double seconds = times_.back() - times_.front();
+  if (seconds > 0.0) {
+    const double perSecond = static_cast<double>(times_.size() - 1) / seconds;
+    const int left = std::max(0, plannedEvaluations_ - completedEvaluations_);
+    writeSpeed(fmt::format("{:.6g}", perSecond));
+    writeTimeLeft(fmt::format("{:.0f}", left / perSecond));
+  }
+  writePercentage();
+  isCancelled();
+}
+
+void ProgressReporter::writePercentage() {
+  if (plannedEvaluations_ <= 0) return;
+  const double percent = std::min(100.0, 100.0 * completedEvaluations_ / plannedEvaluations_);
+  writeProgress(fmt::format("{:.1f}", percent));
+}
+
+void ProgressReporter::progressReplayed(int number, bool ok) {
+  ++completedEvaluations_;
+  writeMessage(withNumber("Evaluation of parameter set No. % taken from the earlier run: ", number) +
+               (ok ? "OK" : "FAILED"));
+  writePercentage();  // the next evaluation may take hours
+  times_.assign(1, clock_());
+}
+
+void ProgressReporter::progressBest(int number, double aggregate, std::string_view foundAt) {
+  writeMessage(fmt::format("Best so far: {} (evaluation {}{}{})", formatReal(aggregate), number,
+                           foundAt.empty() ? "" : ", ", foundAt));
+}
+
+void ProgressReporter::progressEnd(std::string_view ending) {
+  writeStatus(fmt::format("Ended: {}", ending));
+  writeProgress("100.0");
+  if (!closeMessageFile()) {
+    problem_ = fmt::format("The end of the run may not be in {}: {}", messageFile(), std::strerror(errno));
+  }
+}
+
+bool ProgressReporter::isCancelled() {
+  if (!cancelled_) cancelled_ = ::access((baseName_ + std::string(kKillFileEnding)).c_str(), F_OK) == 0;
+  return cancelled_;
+}
+
+}  // namespace mirevo

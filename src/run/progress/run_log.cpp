@@ -1,0 +1,67 @@
+#include "run/progress/run_log.h"
+
+#include <cerrno>
+#include <cstring>
+#include <fcntl.h>
+#include <unistd.h>
+#include <utility>
+
+#include "common/file_copy.h"
+
+namespace mirevo {
+
+RunLog::~RunLog() {
+  close();
+}
+
+bool RunLog::open(const std::string& path, std::string& reason) {
+  close();
+  const int descriptor = ::open(path.c_str(), O_RDWR | O_CREAT | O_TRUNC | O_APPEND | O_CLOEXEC, 0666);
+  if (descriptor < 0) {
+    reason = std::strerror(errno);
+    return false;
+  }
+  path_ = path;
+  descriptor_ = descriptor;
+  const std::string earlier = std::move(pending_);
+  pending_.clear();
+  write(earlier);
+  return true;
+}
+
+void RunLog::close() {
+  const int descriptor = std::exchange(descriptor_, -1);
+  if (descriptor < 0 || ::close(descriptor) == 0 || errno == EINTR) return;
+  if (writeError_.empty()) writeError_ = std::strerror(errno);
+}
+
+void RunLog::line(std::string_view text) {
+  std::string record(text);
+  record += '\n';
+  write(record);
+}
+
+void RunLog::warning(std::string_view text) {
+  line("Warning: " + std::string(text));
+}
+
+/// One write(2) a record, so that records of a signal handler never fall into the middle of one, and nothing is held
+/// back that a kill would lose.
+void RunLog::write(std::string_view record) {
+  if (descriptor_ < 0) {
+    pending_ += record;
+    return;
+  }
+  putBackIfRemoved(descriptor_, path_);  // where that fails the log goes on where nobody sees it, and so may the run
+  while (!record.empty()) {
+    const ssize_t written = ::write(descriptor_, record.data(), record.size());
+    if (written >= 0) {
+      record.remove_prefix(static_cast<std::size_t>(written));
+    } else if (errno != EINTR) {
+      if (writeError_.empty()) writeError_ = std::strerror(errno);
+      return;
+    }
+  }
+}
+
+}  // namespace mirevo

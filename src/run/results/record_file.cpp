@@ -1,0 +1,126 @@
+#include "run/results/record_file.h"
+
+#include <cerrno>
+#include <cstdio>
+#include <cstring>
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+#include <utility>
+
+#include <fmt/format.h>
+
+#include "common/fatal_error.h"
+#include "common/file_copy.h"
+#include "platform/signals/signal_state.h"
+
+namespace mirevo {
+namespace {
+
+[[noreturn]] void failToKeep(const std::string& path, const std::string& reason) {
+  fatalError("Error: Unable to keep the earlier file " + path, reason);
+}
+
+/// A dot in a folder's name is its setup's and begins no ending.
+std::string firstFreeName(const std::string& path, bool isFolder) {
+  const std::size_t nameStart = path.rfind('/') == std::string::npos ? 0 : path.rfind('/') + 1;
+  const std::size_t dot = path.rfind('.');
+  const std::size_t stemEnd = isFolder || dot == std::string::npos || dot <= nameStart ? path.size() : dot;
+  for (int number = 1;; ++number) {
+    std::string name = fmt::format("{}.{}{}", path.substr(0, stemEnd), number, path.substr(stemEnd));
+    struct stat status {};
+    if (::lstat(name.c_str(), &status) == 0) continue;
+    if (errno == ENOENT) return name;
+    const char* reason = std::strerror(errno);  // something may be there, and would be lost
+    failToKeep(path, fmt::format("{}: {}", name, reason));
+  }
+}
+
+}  // namespace
+
+RecordFile::~RecordFile() {
+  std::string reason;
+  tryClose(reason);
+}
+
+void RecordFile::open(const std::string& path) {
+  openWith(path, O_CREAT | O_TRUNC);
+}
+
+void RecordFile::openToContinue(const std::string& path) {
+  openWith(path, O_APPEND);
+  struct stat status {};
+  if (::fstat(descriptor_, &status) != 0) fatalError("Error: Unable to open " + path, std::strerror(errno));
+  size_ = status.st_size;
+}
+
+void RecordFile::openWith(const std::string& path, int flags) {
+  close();
+  path_ = path;
+  size_ = 0;
+  failed_ = false;
+  descriptor_ = ::open(path.c_str(), O_RDWR | O_CLOEXEC | flags, 0666);
+  if (descriptor_ < 0) fatalError("Error: Unable to open " + path, std::strerror(errno));
+}
+
+void RecordFile::append(std::string_view record) {
+  std::string reason;
+  if (!failed_ && !tryAppend(record, reason)) fatalError("Error: Unable to write to " + path_, reason);
+}
+
+bool RecordFile::tryAppend(std::string_view record, std::string& reason) {
+  if (descriptor_ < 0 || failed_) {
+    reason = "the file is closed";
+    return false;
+  }
+  const EndingSignalsHeld held;  // a signal's closing line comes behind a whole record
+  if (!putBackIfRemoved(descriptor_, path_)) {
+    reason = std::string("it was removed and cannot be put back: ") + std::strerror(errno);
+    failed_ = true;
+    return false;
+  }
+  const std::size_t length = record.size();
+  while (!record.empty()) {
+    const ssize_t written = ::write(descriptor_, record.data(), record.size());
+    if (written < 0 && errno == EINTR) continue;
+    if (written < 0) {
+      reason = std::strerror(errno);
+      failed_ = true;
+      // What fitted of the record is no record: readers of the file would take it for one.
+      if (::ftruncate(descriptor_, size_) != 0 && errno != EINVAL) reason += ", and its last line is cut off";
+      return false;
+    }
+    record.remove_prefix(static_cast<std::size_t>(written));
+  }
+  size_ += static_cast<std::int64_t>(length);
+  return true;
+}
+
+void RecordFile::close() {
+  std::string reason;
+  if (!tryClose(reason)) fatalError("Error: Unable to write to " + path_, reason);
+}
+
+bool RecordFile::tryClose(std::string& reason) {
+  const int descriptor = std::exchange(descriptor_, -1);
+  if (descriptor < 0 || ::close(descriptor) == 0 || errno == EINTR) return true;
+  reason = std::strerror(errno);
+  return false;
+}
+
+std::string keepEarlierFile(const std::string& path) {
+  struct stat status {};
+  if (::lstat(path.c_str(), &status) != 0) {
+    if (errno == ENOENT || errno == ENOTDIR) return {};
+    failToKeep(path, std::strerror(errno));
+  }
+  if (!S_ISREG(status.st_mode) && !S_ISDIR(status.st_mode)) return {};
+  std::string kept = firstFreeName(path, S_ISDIR(status.st_mode));
+  if (::rename(path.c_str(), kept.c_str()) != 0) {
+    const char* reason = std::strerror(errno);
+    failToKeep(path, fmt::format("It cannot be renamed to {}: {}", kept, reason));
+  }
+  return kept;
+}
+
+}  // namespace mirevo

@@ -1,0 +1,194 @@
+#include "run/results/restart_settings.h"
+
+#include <algorithm>
+#include <charconv>
+#include <filesystem>
+#include <map>
+#include <unordered_map>
+#include <utility>
+
+#include <fmt/format.h>
+
+#include "common/checksum.h"
+#include "common/files.h"
+#include "common/text.h"
+#include "common/version.h"
+#include "run/setup/keyword_table.h"
+
+namespace mirevo {
+namespace {
+
+constexpr std::string_view kBudgetKeyword = "Max_No_Evaluations";
+constexpr std::string_view kSettingLine = "Setting";
+constexpr std::string_view kFileLine = "File";
+constexpr std::string_view kSearchLine = "Search";
+constexpr std::string_view kLastLine = "End";
+
+bool namesAFileOfResults(const ResultSetting& setting) {
+  return setting.keyword == "BatchFileName" || setting.keyword == "TemplateFileName" ||
+         setting.keyword == "Initial_Sample_File_Name" ||
+         (setting.keyword == "File_Name" && setting.section.ends_with("/OBSERVATION_FILE"));
+}
+
+/// The first `count` cells of a line and the rest of it, which may hold tabs of its own.
+std::vector<std::string> cellsOf(std::string_view line, std::size_t count) {
+  std::vector<std::string> cells;
+  while (cells.size() < count) {
+    const std::size_t tab = line.find('\t');
+    if (tab == std::string_view::npos) return {};
+    cells.emplace_back(line.substr(0, tab));
+    line.remove_prefix(tab + 1);
+  }
+  cells.emplace_back(line);
+  return cells;
+}
+
+std::optional<std::uint64_t> unsignedNumber(std::string_view text, int base) {
+  std::uint64_t number = 0;
+  const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), number, base);
+  if (error != std::errc() || end != text.data() + text.size()) return std::nullopt;
+  return number;
+}
+
+/// Takes one line of the file; false for one that it cannot hold.
+bool readLine(std::string_view line, RestartSettings& settings) {
+  if (line.starts_with(kSettingLine)) {
+    auto cells = cellsOf(line, 3);
+    if (cells.empty()) return false;
+    settings.settings.push_back({std::move(cells[1]), std::move(cells[2]), std::move(cells[3])});
+    return true;
+  }
+  if (line.starts_with(kFileLine)) {
+    auto cells = cellsOf(line, 5);
+    if (cells.empty()) return false;
+    const auto size = unsignedNumber(cells[3], 10);
+    const auto check = unsignedNumber(cells[4], 16);
+    if (!size || !check) return false;
+    settings.files.push_back({std::move(cells[1]), std::move(cells[2]), std::move(cells[5]), *size, *check});
+    return true;
+  }
+  if (line.starts_with(kSearchLine)) {
+    const auto cells = cellsOf(line, 2);
+    if (cells.empty()) return false;
+    const auto budget = parseInteger(cells[1]);
+    const auto last = parseInteger(cells[2]);
+    if (!budget || !last || *last < 1 || *budget < *last) return false;
+    settings.searches.push_back({*budget, *last});
+    return true;
+  }
+  return line.empty() || line.front() == '#';
+}
+
+using SettingIndex = std::map<std::pair<std::string_view, std::string_view>, const ResultSetting*>;
+
+SettingIndex indexOf(const RestartSettings& settings) {
+  SettingIndex index;
+  for (const ResultSetting& setting : settings.settings) index[{setting.section, setting.keyword}] = &setting;
+  return index;
+}
+
+/// A section for a person: "PARAMETER_3 (X3)" where the item has a name, else its whole path.
+std::string shownSection(const SettingIndex& index, std::string_view section) {
+  std::size_t start = 0;
+  while (start < section.size()) {
+    const std::size_t end = std::min(section.find('/', start), section.size());
+    const std::string_view part = section.substr(start, end - start);
+    for (const std::string_view keyword : {"Parameter_Name", "Name"}) {
+      const auto name = index.find({section.substr(0, end), keyword});
+      if (itemPattern(part) == part || name == index.end()) continue;
+      const std::string_view quoted = name->second->value;
+      return fmt::format("{}{} ({})", part, section.substr(end), quoted.substr(1, quoted.size() - 2));
+    }
+    start = end + 1;
+  }
+  return std::string(section);
+}
+
+}  // namespace
+
+RestartSettings restartSettings(const RunConfig& config) {
+  RestartSettings result{config.resultSettings, {}, config.optimisation.earlierSearches};
+  std::unordered_map<std::string, FileMark> known;  // many measures may name one file
+  for (const ResultSetting& setting : result.settings) {
+    if (!namesAFileOfResults(setting) || setting.value.empty()) continue;
+    const auto [entry, isNew] = known.try_emplace(setting.value);
+    FileMark& mark = entry->second;
+    if (isNew) {
+      const auto content = readFileIfThere((std::filesystem::path(config.setupFolder) / setting.value).string());
+      if (content) mark = {{}, {}, {}, content->size(), checksumOf(*content)};
+    }
+    result.files.push_back({setting.section, setting.keyword, setting.value, mark.size, mark.check});
+  }
+  return result;
+}
+
+std::string formatRestartSettings(const RestartSettings& settings) {
+  std::string text = fmt::format(
+      "# What the results beside this file depend on, as it was when they were computed by Mirevo {}.\n"
+      "# A run with Restart = 1 holds its setup against it.\n",
+      programVersion());
+  for (const ResultSetting& setting : settings.settings) {
+    text += fmt::format("{}\t{}\t{}\t{}\n", kSettingLine, setting.section, setting.keyword, setting.value);
+  }
+  for (const FileMark& file : settings.files) {
+    text += fmt::format("{}\t{}\t{}\t{}\t{:016x}\t{}\n", kFileLine, file.section, file.keyword, file.size, file.check,
+                        file.name);
+  }
+  for (const EarlierSearch& search : settings.searches) {
+    text += fmt::format("{}\t{}\t{}\n", kSearchLine, search.maxEvaluations, search.lastEvaluation);
+  }
+  return text + std::string(kLastLine) + '\n';
+}
+
+std::optional<RestartSettings> parseRestartSettings(std::string_view text) {
+  RestartSettings settings;
+  for (const std::string_view line : splitLines(text)) {
+    if (line == kLastLine) return settings;
+    if (!readLine(line, settings)) return std::nullopt;
+  }
+  return std::nullopt;
+}
+
+std::optional<int> searchBudget(const RestartSettings& settings) {
+  for (const ResultSetting& setting : settings.settings) {
+    if (setting.keyword == kBudgetKeyword) return parseInteger(setting.value);
+  }
+  return std::nullopt;
+}
+
+std::vector<std::string> changedSettings(const RestartSettings& then, const RestartSettings& now) {
+  const SettingIndex before = indexOf(then);
+  const SettingIndex after = indexOf(now);
+  std::vector<std::string> changes;
+  const auto note = [&](const ResultSetting& setting, const SettingIndex& index, std::string_view change) {
+    changes.push_back(fmt::format("{} of {}: {}", setting.keyword, shownSection(index, setting.section), change));
+  };
+  const auto earlierBudget = searchBudget(then);
+  const auto budget = searchBudget(now);
+  const bool isRaised = budget && earlierBudget && *budget > *earlierBudget;
+  for (const ResultSetting& setting : now.settings) {
+    const auto found = before.find({setting.section, setting.keyword});
+    if (found == before.end()) {
+      // A keyword that an earlier version did not know worked as its default does now.
+      if (!setting.isDefault) note(setting, after, fmt::format("absent then, {} now", setting.value));
+    } else if (found->second->value != setting.value && !(isRaised && setting.keyword == kBudgetKeyword)) {
+      note(setting, after, fmt::format("{} then, {} now", found->second->value, setting.value));
+    }
+  }
+  for (const ResultSetting& setting : then.settings) {
+    if (after.count({setting.section, setting.keyword}) > 0) continue;
+    note(setting, before, fmt::format("{} then, absent now", setting.value));
+  }
+  for (const FileMark& file : now.files) {
+    const auto isSame = [&file](const FileMark& other) {
+      return other.section == file.section && other.keyword == file.keyword && other.name == file.name;
+    };
+    const auto earlier = std::find_if(then.files.begin(), then.files.end(), isSame);
+    if (earlier == then.files.end() || (earlier->size == file.size && earlier->check == file.check)) continue;
+    note({file.section, file.keyword, {}}, after,
+         fmt::format("the content of {} has changed, {} bytes then, {} now", file.name, earlier->size, file.size));
+  }
+  return changes;
+}
+
+}  // namespace mirevo

@@ -1,0 +1,68 @@
+#pragma once
+
+#include <cstdint>
+#include <map>
+#include <span>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "evaluation/evaluation_result.h"
+#include "run/results/record_file.h"
+#include "run/results/result_table.h"
+
+namespace mirevo {
+
+/// The names over the columns of a result file.
+struct ResultColumns {
+  std::vector<std::string> parameters;  ///< variable parameters
+  std::vector<std::string> measures;
+  std::vector<std::string> objectives;
+};
+
+/// The table of a run's evaluations: `#` head lines, a header row, a row an evaluation, `#` closing lines. Rows are
+/// written as evaluations arrive, so that a killed run leaves every finished one on disk; a file that ends orderly
+/// holds them in the order of their numbers.
+class ResultFile final {
+ public:
+  /// Creates the file with its head lines (without "# "), its header row and the rows of an earlier run, which is then
+  /// in the place of the earlier file: there is no moment at which a row is nowhere. Throws FatalError.
+  void open(const std::string& path, std::span<const std::string> headLines, const ResultColumns& columns,
+            std::span<const ResultTable::Row> earlierRows = {});
+
+  /// One evaluation: `parameterValues` on the model scale, one a column. Throws FatalError when it cannot be written.
+  void addRow(std::span<const double> parameterValues, const EvaluationResult& result);
+
+  /// Gives a row another aggregate than it was written with; takes effect on disk with finish().
+  void replaceAggregate(int number, double aggregate) { aggregates_[number] = aggregate; }
+
+  /// Brings the rows into the order of their numbers and writes the closing lines (without "# "). False, with the
+  /// system's reason, when that fails; what was written before is then still there. Nothing happens to a file that is
+  /// not open.
+  bool finish(std::span<const std::string> closingLines, std::string& reason);
+
+  bool isOpen() const { return file_.isOpen(); }
+  const std::string& path() const { return file_.path(); }
+  /// For signal handlers: -1 while no file is open.
+  int descriptor() const { return file_.descriptor(); }
+
+ private:
+  struct Row {
+    int number;
+    std::int64_t offset;
+    std::int64_t length;
+  };
+  bool isInOrder() const;
+  void appendRow(std::string& text, std::string_view content, const Row& row) const;
+  bool rewriteInOrder(std::string_view closing, std::string& reason) const;
+
+  RecordFile file_;
+  std::int64_t headLength_ = 0;
+  std::vector<Row> rows_;
+  std::map<int, double> aggregates_;  ///< by row number
+};
+
+/// A name as a column's heading: nothing in it that a reader of tab-separated values takes for something else.
+std::string columnName(std::string_view name);
+
+}  // namespace mirevo

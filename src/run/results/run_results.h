@@ -1,0 +1,64 @@
+#pragma once
+
+#include <map>
+#include <optional>
+#include <span>
+#include <string>
+#include <vector>
+
+#include "evaluation/earlier_evaluations.h"
+#include "measures/objective_functions.h"
+#include "measures/observed_series.h"
+#include "parameters/search_space.h"
+#include "run/progress/run_log.h"
+#include "run/results/failed_run_file.h"
+#include "run/results/restart.h"
+#include "run/results/result_file.h"
+#include "run/results/simulated_values_file.h"
+#include "run/setup/run_config.h"
+
+namespace mirevo {
+
+/// The files in which the evaluations of a run are kept, behind those of an earlier run where the setup asks to go on
+/// from it.
+class RunResults final {
+ public:
+  /// Looks for the earlier run, and changes nothing on disk. `filePrefix`: folder and name of the setup; the files'
+  /// names begin with it. Throws FatalError where the earlier run is not one of this setup.
+  RunResults(const RunConfig& config, const SearchSpace& space, const std::string& filePrefix);
+
+  /// DDS: the searches that this run goes on from.
+  std::vector<EarlierSearch> earlierSearches() const;
+
+  /// Opens the files. Results that the run does not go on from are kept under numbered names. `observed`: the series
+  /// whose simulated values are to be kept; empty where the task does not work with them. Says in the log what was
+  /// found. Throws FatalError.
+  void open(const RunConfig& config, std::span<const ObservedSeries> observed, const ObjectiveAggregator& aggregator,
+            RunLog& log);
+
+  /// Closes what stands beside the table. Throws FatalError when what was written did not all arrive.
+  void close();
+
+  ResultFile& table() { return table_; }
+  FailedRunFile& failedRuns() { return failedRuns_; }
+  /// nullptr where the task does not work with simulated values.
+  SimulatedValuesFile* simulatedValues() { return simulatedValues_ ? &*simulatedValues_ : nullptr; }
+  /// nullptr where there is no earlier run to go on from.
+  EarlierEvaluations* earlierEvaluations() { return earlierEvaluations_ ? &*earlierEvaluations_ : nullptr; }
+
+ private:
+  void beginAnew(const RunConfig& config, RunLog& log);
+  void goOn(const RunConfig& config, const ObjectiveAggregator& aggregator, RunLog& log);
+
+  SearchSpace space_;
+  std::string filePrefix_;
+  ResultColumns columns_;
+  std::optional<RestartFiles> files_;  ///< nothing for a task without results
+  std::optional<EarlierRun> earlierRun_;
+  ResultFile table_;
+  FailedRunFile failedRuns_;
+  std::optional<SimulatedValuesFile> simulatedValues_;
+  std::optional<EarlierEvaluations> earlierEvaluations_;
+};
+
+}  // namespace mirevo

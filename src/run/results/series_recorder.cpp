@@ -1,0 +1,167 @@
+#include "run/results/series_recorder.h"
+
+#include <algorithm>
+#include <cmath>
+#include <exception>
+#include <utility>
+
+#include <fmt/format.h>
+
+#include "common/files.h"
+
+namespace mirevo {
+namespace {
+
+/// Writing waits a hundred times as long as it took last, and this long at least.
+constexpr double kLeastSecondsBetween = 5.0;
+constexpr double kShareOfWriting = 0.01;
+/// Of evaluations whose aggregate is not known yet: 48 megabytes.
+constexpr std::size_t kMostUnsettledSteps = 4'000'000;
+
+std::size_t stepCount(const std::vector<PeriodSeries>& series) {
+  std::size_t count = 0;
+  for (const PeriodSeries& one : series) count += one.seconds.size();
+  return count;
+}
+
+bool isSame(std::span<const double> a, std::span<const double> b) {
+  return std::equal(a.begin(), a.end(), b.begin(), b.end());
+}
+
+}  // namespace
+
+SeriesRecorder::SeriesRecorder(std::string path, RecordedSeries run, std::function<double()> clock,
+                               std::function<void(std::string_view)> warn)
+    : path_(std::move(path)), run_(std::move(run)), clock_(std::move(clock)), warn_(std::move(warn)) {}
+
+void SeriesRecorder::resume(std::string_view earlierFile) {
+  const SeriesTable table = readSeriesTable(earlierFile);
+  const auto takeOver = [&](const std::optional<ShownEvaluation>& evaluation, std::vector<float> ShownSeries::*column) {
+    std::optional<Held> held;
+    if (!evaluation) return held;
+    held.emplace().evaluation = *evaluation;
+    for (const std::string& measure : run_.measures) {
+      PeriodSeries& series = held->series.emplace_back();
+      const auto found = std::find_if(table.series.begin(), table.series.end(),
+                                      [&measure](const ShownSeries& shown) { return shown.measure == measure; });
+      if (found != table.series.end()) series = {found->seconds, (*found).*column};
+    }
+    return held;
+  };
+  initial_ = takeOver(table.initial, &ShownSeries::initial);
+  isOfInitialParameters_ = table.isOfInitialParameters;
+  best_ = takeOver(table.best, &ShownSeries::best);
+  isChanged_ = initial_.has_value();
+}
+
+void SeriesRecorder::evaluationFinished(const EvaluationResult& result, std::span<const double> values,
+                                        bool hasInitialParameters, const std::optional<BestEvaluation>& best) {
+  if (!result.shownSeries.empty()) {
+    holdInitial(result, hasInitialParameters);
+    if (std::isnan(result.aggregate)) {
+      holdUnsettled(result, values);
+    } else if (best && (best->number == result.number || isSame(best->parameterValues, values))) {
+      // The best set's final model run is the best evaluation once more.
+      const Held finished{{best->number, best->aggregate}, {values.begin(), values.end()}, result.shownSeries};
+      follow(best, &finished);
+    }
+  }
+  if (isChanged_ && clock_() >= nextWrite_) write();
+}
+
+void SeriesRecorder::holdInitial(const EvaluationResult& result, bool hasInitialParameters) {
+  const bool isBetterChoice =
+      !initial_ || (hasInitialParameters && !isOfInitialParameters_) ||
+      (hasInitialParameters == isOfInitialParameters_ && result.number < initial_->evaluation.number);
+  if (!isBetterChoice) return;
+  initial_ = Held{{result.number, result.aggregate}, {}, result.shownSeries};
+  isOfInitialParameters_ = hasInitialParameters;
+  isChanged_ = true;
+}
+
+void SeriesRecorder::holdUnsettled(const EvaluationResult& result, std::span<const double> values) {
+  const std::size_t steps = stepCount(result.shownSeries);
+  if (unsettledSteps_ + steps > kMostUnsettledSteps) return;
+  unsettledSteps_ += steps;
+  unsettled_[result.number] = {{result.number, result.aggregate}, {values.begin(), values.end()}, result.shownSeries};
+}
+
+/// Holds the series of the run's best evaluation, wherever they are: of the evaluation that has just finished, or of
+/// one whose aggregate was not known when it did.
+void SeriesRecorder::follow(const std::optional<BestEvaluation>& best, const Held* finished) {
+  if (!best || (best_ && best_->evaluation.number == best->number && !best_->series.empty())) return;
+  const auto waiting = unsettled_.find(best->number);
+  if (finished != nullptr) {
+    best_ = *finished;
+  } else if (waiting != unsettled_.end()) {
+    best_ = waiting->second;
+  } else if (best_ && isSame(best_->values, best->parameterValues)) {
+    best_->evaluation.number = best->number;  // of two equal ones the search took the other
+  } else {
+    return;
+  }
+  best_->evaluation.aggregate = best->aggregate;
+  isChanged_ = true;
+}
+
+void SeriesRecorder::aggregateSettled(int number, double aggregate) {
+  if (!initial_ || initial_->evaluation.number != number) return;
+  initial_->evaluation.aggregate = aggregate;
+  isChanged_ = true;
+}
+
+void SeriesRecorder::finish(const std::optional<BestEvaluation>& best) {
+  try {
+    follow(best, nullptr);
+    if (isChanged_) write();
+  } catch (const std::exception& error) {  // out of memory: the run's own ending goes on
+    warn(error.what());
+  }
+}
+
+void SeriesRecorder::warn(std::string_view reason) {
+  if (std::exchange(hasWarned_, true)) return;
+  warn_(fmt::format("The series of the best evaluation cannot be written to {}: {}", path_, reason));
+}
+
+void SeriesRecorder::write() {
+  const double begun = clock_();
+  SeriesTable table;
+  table.headLines = run_.headLines;
+  if (initial_) table.initial = initial_->evaluation;
+  table.isOfInitialParameters = isOfInitialParameters_;
+  if (best_) table.best = best_->evaluation;
+  for (std::size_t i = 0; i < run_.measures.size(); ++i) table.series.push_back(shownSeries(i));
+  std::string reason;
+  if (!replaceFile(path_, seriesTableText(table), reason)) warn(reason);
+  isChanged_ = false;
+  const double ended = clock_();
+  nextWrite_ = ended + std::max(kLeastSecondsBetween, (ended - begun) / kShareOfWriting);
+}
+
+/// The pair's series on all their times in the period.
+ShownSeries SeriesRecorder::shownSeries(std::size_t pair) const {
+  static const PeriodSeries kNone;
+  const PeriodSeries& observed = run_.observations[pair];
+  const PeriodSeries& initial = initial_ ? initial_->series[pair] : kNone;
+  const PeriodSeries& best = best_ ? best_->series[pair] : kNone;
+  ShownSeries shown;
+  shown.measure = run_.measures[pair];
+  for (const PeriodSeries* series : {&observed, &initial, &best}) {
+    for (const std::int64_t second : series->seconds) {
+      if (second >= run_.periodFirst && second <= run_.periodLast) shown.seconds.push_back(second);
+    }
+  }
+  std::sort(shown.seconds.begin(), shown.seconds.end());
+  shown.seconds.erase(std::unique(shown.seconds.begin(), shown.seconds.end()), shown.seconds.end());
+  shown.observed.assign(shown.seconds.size(), std::nanf(""));
+  for (std::size_t i = 0, k = 0; k < observed.seconds.size(); ++k) {  // observations are not interpolated
+    while (i < shown.seconds.size() && shown.seconds[i] < observed.seconds[k]) ++i;
+    if (i < shown.seconds.size() && shown.seconds[i] == observed.seconds[k]) shown.observed[i] = observed.values[k];
+  }
+  shown.initial = valuesAt(initial, shown.seconds);
+  shown.best = valuesAt(best, shown.seconds);
+  return shown;
+}
+
+}  // namespace mirevo

@@ -1,0 +1,155 @@
+#include "run/results/series_table.h"
+
+#include <array>
+#include <charconv>
+#include <cmath>
+#include <limits>
+
+#include <fmt/format.h>
+
+#include "common/calendar.h"
+#include "common/text.h"
+
+namespace mirevo {
+namespace {
+
+constexpr std::string_view kHeader = "Measure\tTime\tObserved\tInitial\tBest";
+constexpr std::string_view kInitial = "Initial: evaluation ";
+constexpr std::string_view kBest = "Best: evaluation ";
+constexpr std::string_view kOfSetup = ", with the initial parameters";
+constexpr std::string_view kOfFirst = ", the first that succeeded";
+constexpr std::string_view kAggregate = ", aggregate ";
+
+void appendCell(std::string& text, float value) {
+  text += '\t';
+  if (std::isfinite(value)) {
+    fmt::format_to(std::back_inserter(text), "{}", value);
+  } else {
+    text += "NaN";
+  }
+}
+
+/// "1981-10-01T00:00:00"
+void appendTime(std::string& text, std::int64_t second) {
+  using namespace date_field;
+  const DateRecord date = dateOfSecond(second);
+  fmt::format_to(std::back_inserter(text), "\t{:04}-{:02}-{:02}T{:02}:{:02}:{:02}", date[kYear], date[kMonth],
+                 date[kDay], date[kHour], date[kMinute], date[kSecond]);
+}
+
+std::optional<std::int64_t> readTime(std::string_view text) {
+  constexpr std::string_view kPattern = "0000-00-00T00:00:00";
+  if (text.size() != kPattern.size()) return std::nullopt;
+  for (std::size_t i = 0; i < text.size(); ++i) {
+    const bool isDigit = text[i] >= '0' && text[i] <= '9';
+    if (kPattern[i] == '0' ? !isDigit : text[i] != kPattern[i]) return std::nullopt;
+  }
+  constexpr std::array<std::size_t, 6> kStarts{0, 5, 8, 11, 14, 17};
+  DateRecord date{};
+  for (std::size_t field = 0; field < kStarts.size(); ++field) {
+    const char* start = text.data() + kStarts[field];
+    std::from_chars(start, start + (field == 0 ? 4 : 2), date[field]);
+  }
+  if (!isValidDate(date) || date[date_field::kSecond] > 59) return std::nullopt;
+  return secondNumber(date);
+}
+
+std::optional<float> readCell(std::string_view text) {
+  if (text == "NaN") return std::numeric_limits<float>::quiet_NaN();
+  float value = 0.0F;
+  const auto read = std::from_chars(text.data(), text.data() + text.size(), value);
+  if (read.ec != std::errc() || read.ptr != text.data() + text.size()) return std::nullopt;
+  return value;
+}
+
+/// What stands behind the words that introduce an evaluation: "17, aggregate 0.5".
+std::optional<ShownEvaluation> readEvaluation(std::string_view text) {
+  const std::size_t aggregate = text.rfind(kAggregate);
+  const auto number = parseInteger(text.substr(0, text.find(',')));
+  if (!number || aggregate == std::string_view::npos) return std::nullopt;
+  const auto value = parseReal(text.substr(aggregate + kAggregate.size()));
+  return ShownEvaluation{*number, value.value_or(std::numeric_limits<double>::quiet_NaN())};
+}
+
+void readHeadLine(std::string_view line, SeriesTable& table) {
+  if (line.starts_with(kInitial)) {
+    table.initial = readEvaluation(line.substr(kInitial.size()));
+    table.isOfInitialParameters = line.find(kOfSetup) != std::string_view::npos;
+  } else if (line.starts_with(kBest)) {
+    table.best = readEvaluation(line.substr(kBest.size()));
+  } else {
+    table.headLines.emplace_back(line);
+  }
+}
+
+void readRow(std::string_view line, SeriesTable& table) {
+  std::array<std::string_view, 5> cells;
+  for (std::size_t i = 0; i < cells.size(); ++i) {
+    const std::size_t tab = line.find('\t');
+    if ((tab == std::string_view::npos) != (i + 1 == cells.size())) return;
+    cells[i] = line.substr(0, tab);
+    line.remove_prefix(tab == std::string_view::npos ? line.size() : tab + 1);
+  }
+  const auto second = readTime(cells[1]);
+  const auto observed = readCell(cells[2]);
+  const auto initial = readCell(cells[3]);
+  const auto best = readCell(cells[4]);
+  if (!second || !observed || !initial || !best) return;
+  if (table.series.empty() || table.series.back().measure != cells[0]) {
+    table.series.emplace_back().measure = std::string(cells[0]);
+  }
+  ShownSeries& series = table.series.back();
+  if (!series.seconds.empty() && *second <= series.seconds.back()) return;
+  series.seconds.push_back(*second);
+  series.observed.push_back(*observed);
+  series.initial.push_back(*initial);
+  series.best.push_back(*best);
+}
+
+}  // namespace
+
+std::string seriesTableText(const SeriesTable& table) {
+  std::string text;
+  for (const std::string& line : table.headLines) text += fmt::format("# {}\n", line);
+  if (table.initial) {
+    text += fmt::format("# {}{}{}{}{}\n", kInitial, table.initial->number,
+                        table.isOfInitialParameters ? kOfSetup : kOfFirst, kAggregate,
+                        formatReal(table.initial->aggregate));
+  }
+  if (table.best) {
+    text += fmt::format("# {}{}{}{}\n", kBest, table.best->number, kAggregate, formatReal(table.best->aggregate));
+  }
+  text.append(kHeader).append("\n");
+  for (const ShownSeries& series : table.series) {
+    for (std::size_t i = 0; i < series.seconds.size(); ++i) {
+      text += series.measure;
+      appendTime(text, series.seconds[i]);
+      appendCell(text, series.observed[i]);
+      appendCell(text, series.initial[i]);
+      appendCell(text, series.best[i]);
+      text += '\n';
+    }
+  }
+  return text;
+}
+
+SeriesTable readSeriesTable(std::string_view text) {
+  SeriesTable table;
+  bool isBelowHeader = false;
+  while (!text.empty()) {
+    const std::size_t end = text.find('\n');
+    if (end == std::string_view::npos) break;  // a cut-off line: the rest of its last number may be missing
+    const std::string_view line = trimTrailing(text.substr(0, end));
+    text.remove_prefix(end + 1);
+    if (isBelowHeader) {
+      readRow(line, table);
+    } else if (line == kHeader) {
+      isBelowHeader = true;
+    } else if (line.starts_with("# ")) {
+      readHeadLine(line.substr(2), table);
+    }
+  }
+  return table;
+}
+
+}  // namespace mirevo

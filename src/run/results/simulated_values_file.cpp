@@ -1,0 +1,87 @@
+#include "run/results/simulated_values_file.h"
+
+#include <cassert>
+#include <cstdint>
+#include <cstring>
+#include <string_view>
+#include <utility>
+
+#include "common/checksum.h"
+#include "common/fatal_error.h"
+#include "common/files.h"
+
+namespace mirevo {
+namespace {
+
+/// The last bytes tell apart machines that store numbers in another order.
+constexpr std::uint64_t kFormatMark = 0x4d69726576307631ULL;
+
+template <class Number>
+void appendBytes(std::string& bytes, const Number& number) {
+  bytes.append(reinterpret_cast<const char*>(&number), sizeof number);
+}
+
+template <class Number>
+Number numberAt(std::string_view bytes, std::size_t offset) {
+  Number number{};
+  std::memcpy(&number, bytes.data() + offset, sizeof number);
+  return number;
+}
+
+std::string head(std::size_t valueCount) {
+  std::string bytes;
+  appendBytes(bytes, kFormatMark);
+  appendBytes(bytes, static_cast<std::uint64_t>(valueCount));
+  return bytes;
+}
+
+}  // namespace
+
+SimulatedValuesFile::SimulatedValuesFile(std::string path, std::size_t valueCount)
+    : path_(std::move(path)), valueCount_(valueCount) {}
+
+void SimulatedValuesFile::create() {
+  file_.open(path_);
+  file_.append(head(valueCount_));
+}
+
+std::string SimulatedValuesFile::encode(int number, const std::vector<double>& values) const {
+  std::string bytes;
+  appendBytes(bytes, static_cast<std::int64_t>(number));
+  bytes.append(reinterpret_cast<const char*>(values.data()), values.size() * sizeof(double));
+  appendBytes(bytes, checksumOf(bytes));
+  return bytes;
+}
+
+void SimulatedValuesFile::add(const EvaluationResult& result) {
+  assert(result.simulatedValues.size() == valueCount_);
+  file_.append(encode(result.number, result.simulatedValues));
+}
+
+std::map<int, std::vector<double>> SimulatedValuesFile::takeUp(const std::set<int>& numbers) {
+  std::string reason;
+  const std::string content = readFileIfThere(path_).value_or("");
+  std::string kept = head(valueCount_);
+  std::map<int, std::vector<double>> found;
+  const std::size_t contentLength = sizeof(std::int64_t) + valueCount_ * sizeof(double);
+  const std::size_t recordLength = contentLength + sizeof(std::uint64_t);
+  std::string_view rest = content;
+  if (!rest.starts_with(kept)) rest = {};
+  if (!rest.empty()) rest.remove_prefix(kept.size());
+  for (; rest.size() >= recordLength; rest.remove_prefix(recordLength)) {
+    const std::string_view record = rest.substr(0, recordLength);
+    const auto number = numberAt<std::int64_t>(record, 0);
+    const bool isSound = checksumOf(record.substr(0, contentLength)) == numberAt<std::uint64_t>(record, contentLength);
+    if (!isSound || numbers.count(static_cast<int>(number)) == 0) continue;
+    std::vector<double> values(valueCount_);
+    if (valueCount_ > 0) {
+      std::memcpy(values.data(), record.data() + sizeof(std::int64_t), valueCount_ * sizeof(double));
+    }
+    if (found.emplace(static_cast<int>(number), std::move(values)).second) kept += record;
+  }
+  if (kept != content && !replaceFile(path_, kept, reason)) fatalError("Error: Unable to write to " + path_, reason);
+  file_.openToContinue(path_);
+  return found;
+}
+
+}  // namespace mirevo

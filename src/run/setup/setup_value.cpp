@@ -1,0 +1,162 @@
+#include "run/setup/setup_value.h"
+
+#include <cassert>
+
+#include <fmt/format.h>
+
+#include "common/text.h"
+#include "platform/kdx/kdx_value.h"
+
+// GCC 12 under the sanitizers takes the alternatives of a variant inside a variant for uninitialised.
+#if defined(__GNUC__) && !defined(__clang__)
+#pragma GCC diagnostic ignored "-Wmaybe-uninitialized"
+#endif
+
+namespace mirevo {
+namespace {
+
+using Converted = std::variant<SetupValue, SetupValueError>;
+
+std::string_view wanted(KeywordType type) {
+  switch (type) {
+    case KeywordType::integer:
+      return "an integer within 32 bits";
+    case KeywordType::real:
+    case KeywordType::realList:
+      return "a number";
+    case KeywordType::date:
+      return "a date such as 2001-01-31 or 2001-01-31 12:30";
+    case KeywordType::name:
+    case KeywordType::text:
+    case KeywordType::freeText:
+    case KeywordType::textLines:
+    case KeywordType::fileName:
+      break;
+  }
+  return "a text between quotes";
+}
+
+std::string found(const KdxValue& value) {
+  struct Words {
+    std::string operator()(std::int32_t number) const { return std::to_string(number); }
+    std::string operator()(double number) const {
+      const std::string text = formatReal(number);
+      const bool isWhole = text.find_first_not_of("-0123456789") == std::string::npos;
+      return isWhole && parseInteger(text) ? text + ".0" : text;  // tells 2.0 from 2 where that is the fault
+    }
+    std::string operator()(const std::string& text) const { return "the text " + quotedForMessage(text); }
+    std::string operator()(const DateRecord& date) const { return "the date " + formatKdxDate(date); }
+  };
+  return std::visit(Words{}, value.value);
+}
+
+SetupValueError mismatch(KeywordType type, const KdxValue& value) {
+  return {value.position, fmt::format("expected {}, found {}", wanted(type), found(value))};
+}
+
+std::optional<double> asReal(const KdxValue& value) {
+  if (const auto* real = std::get_if<double>(&value.value)) return *real;
+  if (const auto* integer = std::get_if<std::int32_t>(&value.value)) return *integer;
+  return std::nullopt;
+}
+
+Converted convertText(KeywordType type, const KdxValue& value) {
+  const auto* text = std::get_if<std::string>(&value.value);
+  if (text == nullptr) return mismatch(type, value);
+  std::string trimmed(trimTrailing(*text));
+  const bool isField = type == KeywordType::name || type == KeywordType::text || type == KeywordType::fileName;
+  if (isField && trimmed.size() > kFieldWidth) {
+    return SetupValueError{value.position,
+                           fmt::format("expected a text of at most {} bytes, found {}", kFieldWidth, trimmed.size())};
+  }
+  if (type == KeywordType::name) {
+    if (trimmed.empty()) return SetupValueError{value.position, "expected a name, found a blank text"};
+    if (trimmed.find('\t') != std::string::npos) {
+      return SetupValueError{value.position, "expected a name without tabs, which separate the columns of the results"};
+    }
+  }
+  return SetupValue(std::move(trimmed));
+}
+
+Converted convertDate(const KdxValue& value) {
+  if (const auto* date = std::get_if<DateRecord>(&value.value)) return SetupValue(*date);
+  const auto* text = std::get_if<std::string>(&value.value);
+  const auto date = text == nullptr ? std::nullopt : parseKdxDate(*text);
+  if (!date) return mismatch(KeywordType::date, value);
+  return SetupValue(*date);
+}
+
+Converted convertList(const KdxKeyword& keyword) {
+  std::vector<double> list;
+  list.reserve(keyword.values.size());
+  for (const KdxValue& value : keyword.values) {
+    const auto real = asReal(value);
+    if (!real) return mismatch(KeywordType::realList, value);
+    list.push_back(*real);
+  }
+  return SetupValue(std::move(list));
+}
+
+Converted convertOne(KeywordType type, const KdxValue& value) {
+  switch (type) {
+    case KeywordType::integer:
+      if (const auto* integer = std::get_if<std::int32_t>(&value.value)) return SetupValue(*integer);
+      return mismatch(type, value);
+    case KeywordType::real:
+    case KeywordType::realList:
+      if (const auto real = asReal(value)) return SetupValue(*real);
+      return mismatch(type, value);
+    case KeywordType::date:
+      return convertDate(value);
+    case KeywordType::name:
+    case KeywordType::text:
+    case KeywordType::freeText:
+    case KeywordType::textLines:
+    case KeywordType::fileName:
+      break;
+  }
+  return convertText(type, value);
+}
+
+std::string inQuotes(std::string_view text) {
+  std::string quoted = "'";
+  for (const char c : text) quoted += c == '\'' ? "''" : std::string(1, c);
+  return quoted + "'";
+}
+
+}  // namespace
+
+Converted convertSetupValue(const KeywordRow& row, const KdxKeyword& keyword) {
+  if (row.type == KeywordType::realList) return convertList(keyword);
+  if (keyword.values.size() != 1) {
+    return SetupValueError{keyword.values.size() > 1 ? keyword.values[1].position : keyword.position,
+                           fmt::format("expected one value, found {}", keyword.values.size())};
+  }
+  return convertOne(row.type, keyword.values.front());
+}
+
+SetupValue defaultSetupValue(const KeywordRow& row) {
+  KdxCursor cursor(row.defaultValue);
+  const auto value = readKdxValue(cursor, '=');
+  assert(std::holds_alternative<KdxValue>(value));
+  const auto converted = convertOne(row.type, std::get<KdxValue>(value));
+  assert(std::holds_alternative<SetupValue>(converted));
+  return std::get<SetupValue>(converted);
+}
+
+std::string formatSetupValue(const SetupValue& value) {
+  struct Text {
+    std::string operator()(std::int32_t number) const { return std::to_string(number); }
+    std::string operator()(double number) const { return formatReal(number); }
+    std::string operator()(const std::string& text) const { return inQuotes(text); }
+    std::string operator()(const DateRecord& date) const { return formatKdxDate(date); }
+    std::string operator()(const std::vector<double>& list) const {
+      std::string text;
+      for (const double number : list) text += (text.empty() ? "" : ", ") + formatReal(number);
+      return text;
+    }
+  };
+  return std::visit(Text{}, value);
+}
+
+}  // namespace mirevo

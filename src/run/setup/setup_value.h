@@ -1,0 +1,27 @@
+#pragma once
+
+#include <optional>
+#include <string>
+
+#include "platform/kdx/kdx.h"
+#include "run/setup/keyword_table.h"
+
+namespace mirevo {
+
+/// A value that is not of the keyword's type.
+struct SetupValueError {
+  KdxPosition position;
+  std::string explanation;  ///< "expected an integer, found 1.5"
+};
+
+/// The values of a keyword as the value that its row asks for. An integer is taken where a real is wanted and a text
+/// that has the form of a date where a date is, nothing else is turned into another type. Texts lose trailing blanks.
+std::variant<SetupValue, SetupValueError> convertSetupValue(const KeywordRow& row, const KdxKeyword& keyword);
+
+/// The default of a row that has one.
+SetupValue defaultSetupValue(const KeywordRow& row);
+
+/// The value as a setup would have it.
+std::string formatSetupValue(const SetupValue& value);
+
+}  // namespace mirevo

@@ -1,0 +1,116 @@
+#include "run/setup/setup_warnings.h"
+
+#include <fmt/format.h>
+
+#include "common/text.h"
+#include "platform/equations/expression_evaluator.h"
+
+namespace mirevo {
+namespace {
+
+/// A misread file could give a warning a line; a log that nobody can read helps nobody.
+constexpr int kMostWarnings = 50;
+
+class EntryCheck final {
+ public:
+  explicit EntryCheck(SetupFile& file) : file_(file) {}
+
+  /// Depth is that of the parser at most.
+  void checkInside(const KdxSection& node, const std::string& pattern) {
+    for (const KdxKeyword& keyword : node.keywords()) checkKeyword(node, keyword, pattern);
+    for (const auto& section : node.sections()) {
+      const std::string name = itemPattern(section->name());
+      const std::string path = pattern.empty() ? name : fmt::format("{}/{}", pattern, name);
+      const bool isFirst = node.section(section->name()) == section.get();
+      if (findSection(path) == nullptr) {
+        warn(section->position(), "section", section->name(),
+             nearestName(section->name(), sectionNamesInside(pattern)));
+      } else if (!isFirst) {
+        warnRepeated(section->position(), "section", section->name(), node.section(section->name())->position());
+      } else {
+        checkInside(*section, path);
+      }
+    }
+  }
+
+  void finish() {
+    if (count_ > kMostWarnings) file_.log().warning(fmt::format("{} more like these", count_ - kMostWarnings));
+  }
+
+ private:
+  void checkKeyword(const KdxSection& node, const KdxKeyword& keyword, const std::string& pattern) {
+    const KeywordRow* row = findKeyword(pattern, keyword.name);
+    if (row == nullptr) {
+      std::vector<std::string> known;
+      for (const KeywordRow& other : keywordsOf(pattern)) known.emplace_back(other.name);
+      warn(keyword.position, "keyword", keyword.name, nearestName(keyword.name, known));
+    } else if (row->type != KeywordType::textLines && node.keyword(keyword.name) != &keyword) {
+      warnRepeated(keyword.position, "keyword", keyword.name, node.keyword(keyword.name)->position);
+    }
+  }
+
+  void warn(KdxPosition position, std::string_view kind, const std::string& name,
+            const std::optional<std::string>& nearest) {
+    report(position, fmt::format("{} {} is unknown and not read{}", kind, quotedForMessage(name),
+                                 nearest ? fmt::format(", did you mean {}?", quotedForMessage(*nearest)) : ""));
+  }
+
+  void warnRepeated(KdxPosition position, std::string_view kind, const std::string& name, KdxPosition first) {
+    report(position, fmt::format("{} {} stands at line {} already, this one is not read", kind, quotedForMessage(name),
+                                 first.line));
+  }
+
+  void report(KdxPosition position, const std::string& text) {
+    if (++count_ <= kMostWarnings) file_.log().warning(fmt::format("{}: {}", file_.place(position), text));
+  }
+
+  SetupFile& file_;
+  int count_ = 0;
+};
+
+}  // namespace
+
+void warnAboutUnusedEntries(SetupFile& file) {
+  EntryCheck check(file);
+  // Other targets belong to other programs; a second one of ours would go unread.
+  const KdxSection& root = file.document().root;
+  const KdxSection* target = root.section(kSetupTarget);
+  if (target == nullptr) return;
+  if (const KdxSection* second = root.section(kSetupTarget, 2)) {
+    file.log().warning(fmt::format("{}: a second [{}] is not read", file.place(second->position()), kSetupTarget));
+  }
+  check.checkInside(*target, "");
+  check.finish();
+}
+
+std::vector<std::string> unusedParameterWarnings(std::span<const ModelParameter> parameters,
+                                                 std::span<const ParameterTemplate> templates) {
+  std::vector<std::size_t> toFollow;
+  for (const ParameterTemplate& parameterTemplate : templates) {
+    for (const std::size_t index : parameterTemplate.parametersNamed()) toFollow.push_back(index);
+  }
+  std::vector<std::string> names;
+  for (const ModelParameter& parameter : parameters) names.push_back(parameter.name);
+  std::vector<double> values(parameters.size());
+  const ExpressionEvaluator equations(names, values);
+  std::vector<bool> isUsed(parameters.size());
+  while (!toFollow.empty()) {
+    const std::size_t index = toFollow.back();
+    toFollow.pop_back();
+    if (isUsed[index]) continue;
+    isUsed[index] = true;
+    if (parameters[index].parameterType != ParameterType::dependent) continue;
+    const auto equation = equations.compile(parameters[index].equation);
+    toFollow.insert(toFollow.end(), equation->variables().begin(), equation->variables().end());
+  }
+  std::vector<std::string> warnings;
+  for (std::size_t i = 0; i < parameters.size(); ++i) {
+    if (isUsed[i] || parameters[i].parameterType != ParameterType::variable) continue;
+    warnings.push_back(
+        fmt::format("the variable parameter {} stands in no template: its value does not reach the model",
+                    quotedForMessage(parameters[i].name)));
+  }
+  return warnings;
+}
+
+}  // namespace mirevo

@@ -1,9 +1,0 @@
-#include "run/version.h"
-
-namespace mirevo {
-
-std::string_view programVersion() {
-  return MIREVO_VERSION;
-}
-
-}  // namespace mirevo

@@ -1,0 +1,181 @@
+#include "algorithms/analyses/covariance.h"
+
+#include <cmath>
+#include <functional>
+#include <limits>
+
+#include <fmt/format.h>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "algorithms/analyses/local_sensitivity.h"
+
+namespace mirevo {
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::HasSubstr;
+
+constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
+
+SearchSpace spaceOf(std::vector<double> initial, TransformationType type = TransformationType::none) {
+  SearchSpace space;
+  for (std::size_t j = 0; j < initial.size(); ++j) {
+    space.names.push_back(fmt::format("b{}", j + 1));
+    space.lower.push_back(initial[j] - 1000.0);
+    space.upper.push_back(initial[j] + 1000.0);
+    space.transformation.push_back(type);
+  }
+  space.initial = std::move(initial);
+  return space;
+}
+
+// The straight line a + b x through x = 0..4: X'X = (5 10; 10 30), its inverse (0.6 -0.2; -0.2 0.1).
+TEST(ParameterCovariance, MatchesTheStraightLineInClosedForm) {
+  const LinearisedModel line{{0.1, -0.2, 0.3, -0.3, 0.1}, {}, {{1, 1, 1, 1, 1}, {0, 1, 2, 3, 4}}};
+  const double s2 = (0.01 + 0.04 + 0.09 + 0.09 + 0.01) / 3.0;
+  const ParameterCovariance result = parameterCovariance(line);
+  EXPECT_EQ(result.degreesOfFreedom, 3U);
+  EXPECT_NEAR(result.errorVariance, s2, 1e-16);
+  EXPECT_NEAR(result.covariance[0][0], 0.6 * s2, 1e-15);
+  EXPECT_NEAR(result.covariance[1][0], -0.2 * s2, 1e-15);
+  EXPECT_NEAR(result.covariance[1][1], 0.1 * s2, 1e-15);
+  EXPECT_NEAR(result.correlation[0][1], -0.2 / std::sqrt(0.06), 1e-14);
+  EXPECT_NEAR(result.tQuantile, 3.182446305284263, 1e-12);  // table of Student's t, 3 degrees of freedom
+
+  // A weight of 2 is the same row twice but for the degrees of freedom; a weight of 0 and a missing residual are no row
+  // but for those of the former.
+  LinearisedModel weighted = line;
+  weighted.weights = {2, 1, 1, 1, 1};
+  LinearisedModel doubled{{0.1, 0.1, -0.2, 0.3, -0.3, 0.1, kNaN}, {}, {{1, 1, 1, 1, 1, 1, 1}, {0, 0, 1, 2, 3, 4, 9}}};
+  const ParameterCovariance a = parameterCovariance(weighted);
+  const ParameterCovariance b = parameterCovariance(doubled);
+  EXPECT_EQ(b.observationCount, 6U);
+  EXPECT_NEAR(a.covariance[0][1] * 3.0, b.covariance[0][1] * 4.0, 1e-15);
+}
+
+TEST(ParameterCovariance, SurvivesExtremeUnitsOfAParameter) {
+  const LinearisedModel line{
+      {0.1, -0.2, 0.3, -0.3, 0.1}, {}, {{1e-200, 1e-200, 1e-200, 1e-200, 1e-200}, {0, 1e140, 2e140, 3e140, 4e140}}};
+  const ParameterCovariance result = parameterCovariance(line);
+  EXPECT_NEAR(result.standardDeviations[0] / 1e200, std::sqrt(0.6 * 0.08), 1e-14);
+  EXPECT_NEAR(result.correlation[0][1], -0.2 / std::sqrt(0.06), 1e-14);
+}
+
+TEST(ParameterCovariance, LeavesOutWhatHasNoVarianceByName) {
+  // Columns: constant, zero, unknown, line, constant + 2 line.
+  const LinearisedModel model{{0.1, -0.2, 0.3, -0.3, 0.1},
+                              {},
+                              {{1, 1, 1, 1, 1}, {0, 0, 0, 0, 0}, {1, kNaN, 2, 3, 4}, {0, 1, 2, 3, 4}, {1, 3, 5, 7, 9}}};
+  const ParameterCovariance result = parameterCovariance(model);
+  EXPECT_THAT(result.kept, ElementsAre(0, 3));
+  EXPECT_NEAR(result.covariance[1][1], 0.1 * 0.08, 1e-15);
+  const SearchSpace space = spaceOf({1, 2, 3, 4, 5});
+  EXPECT_THAT(
+      formatCovariance(result, space, space.initial),
+      ::testing::IsSupersetOf({std::string("Parameter covariance: 5 observations, 2 parameters, 3 degrees of freedom"),
+                               std::string("Warning: Parameter b2 is left out of the covariance matrix: "
+                                           "no simulated value depends on it"),
+                               std::string("Warning: Parameter b3 is left out of the covariance matrix: "
+                                           "its derivatives are not known"),
+                               std::string("Warning: Parameter b5 is left out of the covariance matrix: "
+                                           "its effect cannot be told from that of the parameters before it")}));
+}
+
+TEST(ParameterCovariance, SaysWhenThereIsNothingToEstimateItFrom) {
+  const SearchSpace space = spaceOf({1, 2});
+  const ParameterCovariance exact = parameterCovariance({{0.1, 0.2}, {}, {{1, 1}, {0, 1}}});
+  EXPECT_THAT(formatCovariance(exact, space, space.initial),
+              ElementsAre(HasSubstr("0 degrees"), HasSubstr("more observations than parameters")));
+  const ParameterCovariance none = parameterCovariance({{0.1, 0.2}, {}, {{0, 0}, {0, 0}}});
+  EXPECT_TRUE(none.kept.empty());
+  EXPECT_EQ(formatCovariance(none, space, space.initial).size(), 3U);
+  EXPECT_TRUE(parameterCovariance({}).kept.empty());
+}
+
+TEST(ParameterCovariance, WarnsOfParametersThatAreHardToTellApart) {
+  const ParameterCovariance result =
+      parameterCovariance({{0.1, -0.2, 0.3, -0.3, 0.1}, {}, {{10, 11, 12, 13, 14}, {1, 1, 1, 1, 1}}});
+  const SearchSpace space = spaceOf({1, 2});
+  EXPECT_EQ(formatCovariance(result, space, space.initial).back(),
+            "Warning: Parameters b1 and b2 are correlated by -0.9931: the observations hardly tell them apart");
+}
+
+TEST(ParameterLimits, AreTransformedForALogarithmicParameter) {
+  ParameterCovariance result = parameterCovariance({{0.1, -0.2, 0.3, -0.3, 0.1}, {}, {{1, 1, 1, 1, 1}}});
+  const std::vector<double> set = {std::log(20.0)};
+  const SearchSpace space = spaceOf(set, TransformationType::logarithmic);
+  const double deviation = std::sqrt(0.24 / 4.0 / 5.0);
+  const double reach = 2.7764451051977987 * deviation;  // 4 degrees of freedom
+  const ParameterLimits limits = parameterLimits(result, space, set).front();
+  EXPECT_NEAR(limits.value, 20.0, 1e-13);
+  EXPECT_NEAR(limits.standardDeviation, 20.0 * deviation, 1e-13);
+  EXPECT_NEAR(limits.lower, 20.0 * std::exp(-reach), 1e-11);
+  EXPECT_NEAR(limits.upper, 20.0 * std::exp(reach), 1e-11);
+}
+
+// Data and certified values: Statistical Reference Datasets, nonlinear regression, National Institute of Standards and
+// Technology (public domain), data sets Misra1a and Thurber.
+struct Certified {
+  const char* name;
+  std::vector<double> y, x;
+  std::function<double(const std::vector<double>&, double)> model;
+  std::vector<double> parameters, deviations;
+  double residualSumOfSquares, residualDeviation;
+};
+
+std::vector<Certified> certifiedSets() {
+  return {
+      {"Misra1a",
+       {10.07, 14.73, 17.94, 23.93, 29.61, 35.18, 40.02, 44.82, 50.76, 55.05, 61.01, 66.40, 75.47, 81.78},
+       {77.6, 114.9, 141.1, 190.8, 239.9, 289.0, 332.8, 378.4, 434.8, 477.3, 536.8, 593.1, 689.1, 760.0},
+       [](const std::vector<double>& b, double x) { return b[0] * (1.0 - std::exp(-b[1] * x)); },
+       {2.3894212918E+02, 5.5015643181E-04},
+       {2.7070075241E+00, 7.2668688436E-06},
+       1.2455138894E-01,
+       1.0187876330E-01},
+      {"Thurber",
+       {80.574,   84.248,   87.264,   87.195,   89.076,   89.608,   89.868,   90.101,   92.405,   95.854,
+        100.696,  101.060,  401.672,  390.724,  567.534,  635.316,  733.054,  759.087,  894.206,  990.785,
+        1090.109, 1080.914, 1122.643, 1178.351, 1260.531, 1273.514, 1288.339, 1327.543, 1353.863, 1414.509,
+        1425.208, 1421.384, 1442.962, 1464.350, 1468.705, 1447.894, 1457.628},
+       {-3.067, -2.981, -2.921, -2.912, -2.840, -2.797, -2.702, -2.699, -2.633, -2.481, -2.363, -2.322, -1.501,
+        -1.460, -1.274, -1.212, -1.100, -1.046, -0.915, -0.714, -0.566, -0.545, -0.400, -0.309, -0.109, -0.103,
+        0.010,  0.119,  0.377,  0.790,  0.963,  1.006,  1.115,  1.572,  1.841,  2.047,  2.200},
+       [](const std::vector<double>& b, double x) {
+         return (b[0] + x * (b[1] + x * (b[2] + x * b[3]))) / (1.0 + x * (b[4] + x * (b[5] + x * b[6])));
+       },
+       {1.2881396800E+03, 1.4910792535E+03, 5.8323836877E+02, 7.5416644291E+01, 9.6629502864E-01, 3.9797285797E-01,
+        4.9727297349E-02},
+       {4.6647963344E+00, 3.9571156086E+01, 2.8698696102E+01, 5.5675370270E+00, 3.1333340687E-02, 1.4984928198E-02,
+        6.5842344623E-03},
+       5.6427082397E+03,
+       1.3714600784E+01},
+  };
+}
+
+TEST(ParameterCovariance, ReproducesCertifiedStandardDeviations) {
+  for (const Certified& set : certifiedSets()) {
+    const SearchSpace space = spaceOf(set.parameters);
+    const PerturbationPlan plan = planPerturbations({1, 1, 1e-4}, space, space.initial);
+    std::vector<std::vector<double>> simulated;
+    for (const ParameterSet& parameters : plan.sets) {
+      simulated.emplace_back();
+      for (const double x : set.x) simulated.back().push_back(set.model(parameters, x));
+    }
+    const auto model = linearise(plan, simulated, set.y, {});
+    ASSERT_TRUE(model.has_value());
+    double sumOfSquares = 0.0;
+    for (const double r : model->residuals) sumOfSquares += r * r;
+    EXPECT_NEAR(sumOfSquares / set.residualSumOfSquares, 1.0, 1e-9) << set.name << ": data or model differ";
+    const ParameterCovariance result = parameterCovariance(*model);
+    ASSERT_EQ(result.kept.size(), set.parameters.size()) << set.name;
+    EXPECT_NEAR(std::sqrt(result.errorVariance) / set.residualDeviation, 1.0, 1e-9);
+    for (std::size_t j = 0; j < set.parameters.size(); ++j) {
+      EXPECT_NEAR(result.standardDeviations[j] / set.deviations[j], 1.0, 1e-6) << set.name << " b" << j + 1;
+    }
+  }
+}
+
+}  // namespace
+}  // namespace mirevo

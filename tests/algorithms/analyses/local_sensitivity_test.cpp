@@ -1,0 +1,162 @@
+#include "algorithms/analyses/local_sensitivity.h"
+
+#include <cmath>
+
+#include <fmt/format.h>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "algorithms/function_evaluator.h"
+
+namespace mirevo {
+namespace {
+
+using ::testing::Contains;
+using ::testing::ElementsAre;
+using testing::FunctionEvaluator;
+
+struct Parameter {
+  TransformationType type;
+  double initial, lower, upper;  // search scale; an integer parameter's upper one above its largest value
+};
+
+SearchSpace spaceOf(const std::vector<Parameter>& parameters) {
+  SearchSpace space;
+  for (const Parameter& p : parameters) {
+    space.names.push_back(fmt::format("p{}", space.names.size() + 1));
+    space.initial.push_back(p.initial);
+    space.lower.push_back(p.lower);
+    space.upper.push_back(p.upper);
+    space.transformation.push_back(p.type);
+  }
+  return space;
+}
+
+constexpr auto kNone = TransformationType::none;
+constexpr auto kLog = TransformationType::logarithmic;
+constexpr auto kInteger = TransformationType::integer;
+
+TEST(PlanPerturbations, TakesItsStepsInsideTheBounds) {
+  struct Case {
+    const char* what;
+    Parameter parameter;
+    SensitivitySettings settings;  // differencing, option, fraction
+    double minus, plus;            // values of the parameter; equal: not perturbed
+  };
+  const Case cases[] = {
+      {"forward, of the range", {kNone, 2, 0, 10}, {0, 0, 0.1}, 2, 3},
+      {"central, of the range", {kNone, 2, 0, 10}, {1, 0, 0.1}, 1, 3},
+      {"of a negative value", {kNone, -2, -10, 10}, {0, 1, 0.1}, -2, -1.8},
+      {"up to the bound itself", {kNone, 9, 0, 10}, {0, 0, 0.1}, 9, 10},
+      {"inwards at the upper bound", {kNone, 10, 0, 10}, {0, 0, 0.1}, 9, 10},
+      {"central at the lower bound", {kNone, 0, 0, 10}, {1, 0, 0.1}, 0, 1},
+      {"no room either way", {kNone, 4, 0, 10}, {1, 0, 0.8}, 4, 10},
+      {"no room, more below", {kNone, 6, 0, 10}, {1, 0, 0.8}, 0, 6},
+      {"equal bounds", {kNone, 3, 3, 3}, {1, 0, 0.1}, 3, 3},
+      {"equal bounds, of the value", {kNone, 3, 3, 3}, {0, 1, 0.1}, 3, 3},
+      {"value 0", {kNone, 0, -1, 1}, {0, 1, 0.1}, 0, 0},
+      {"logarithmic, of the range", {kLog, 0, -2, 2}, {1, 0, 0.25}, -1, 1},
+      {"logarithmic, of the value", {kLog, 0, -2, 2}, {1, 1, 0.5}, -std::log(1.5), std::log(1.5)},
+      {"integer, at least one", {kInteger, 5, 0, 11}, {1, 0, 0.01}, 4, 6},
+      {"integer, rounded", {kInteger, 5, 0, 11}, {1, 0, 0.26}, 2, 8},
+      {"integer at its largest value", {kInteger, 10, 0, 11}, {0, 0, 0.01}, 9, 10},
+      {"integer of one value", {kInteger, 4, 4, 5}, {0, 0, 0.01}, 4, 4},
+  };
+  for (const Case& c : cases) {
+    const SearchSpace space = spaceOf({{kNone, 7, 0, 14}, c.parameter});
+    const PerturbationPlan plan = planPerturbations(c.settings, space, space.initial);
+    EXPECT_EQ(plan.sets[0], space.initial);
+    const ParameterDifference& difference = plan.differences[1];
+    EXPECT_DOUBLE_EQ(plan.sets[difference.minus][1], c.minus) << c.what;
+    EXPECT_DOUBLE_EQ(plan.sets[difference.plus][1], c.plus) << c.what;
+    EXPECT_EQ(difference.problem.empty(), c.minus < c.plus) << c.what;
+    EXPECT_DOUBLE_EQ(difference.width, c.plus - c.minus) << c.what;
+    EXPECT_EQ(plan.sets[difference.minus][0], 7.0) << c.what;
+    EXPECT_EQ(plan.sets[difference.plus][0], 7.0) << c.what;
+  }
+}
+
+TEST(PlanPerturbations, NamesAStepThatRoundsAway) {
+  const SearchSpace space = spaceOf({{kNone, 1e18, 1e18 - 1e4, 1e18 + 1e4}});
+  const PerturbationPlan plan = planPerturbations({0, 0, 1e-6}, space, space.initial);
+  EXPECT_EQ(plan.differences[0].problem, "the perturbation is too small to change its value");
+}
+
+/// Measures x² + 3y and e^z; objective functions 2y and z.
+EvaluationResult evaluate(const ParameterSet& p) {
+  EvaluationResult result;
+  result.measureValues = {p[0] * p[0] + 3.0 * p[1], std::exp(p[2])};
+  result.objectiveValues = {2.0 * p[1] + 0.1 * p[0], p[2]};
+  return result;
+}
+
+TEST(LocalSensitivity, HasDerivativesScaledCompositeAndRanking) {
+  FunctionEvaluator evaluator(evaluate);
+  const SearchSpace space = spaceOf({{kNone, 2, 0, 4}, {kNone, 1, 0, 10}, {kLog, 1, 0, 2}});
+  const LocalSensitivity central = localSensitivity({1, 0, 0.1}, space, evaluator);
+  ASSERT_EQ(evaluator.batches.size(), 1U);
+  EXPECT_EQ(evaluator.batches[0].size(), 7U);
+  EXPECT_EQ(evaluator.batches[0][0], space.initial);
+  EXPECT_NEAR(central.measures.derivatives[0][0], 4.0, 1e-13);  // central differences of a square are exact
+  EXPECT_NEAR(central.measures.derivatives[1][0], 3.0, 1e-13);
+  EXPECT_NEAR(central.measures.derivatives[2][1], std::exp(1.0) * std::sinh(0.2) / 0.2, 1e-13);
+  EXPECT_NEAR(central.measures.scaled[0][0], 4.0 * 4.0 / 7.0, 1e-13);
+  EXPECT_NEAR(central.objectives.scaled[1][0], 2.0 * 10.0 / 2.2, 1e-13);
+  EXPECT_NEAR(central.objectives.composite[1], 20.0 / 2.2 / std::sqrt(2.0), 1e-13);
+  EXPECT_THAT(central.ranking, ElementsAre(1, 2, 0));
+
+  const LocalSensitivity forward = localSensitivity({0, 1, 0.1}, space, evaluator);
+  EXPECT_EQ(evaluator.batches[1].size(), 4U);
+  EXPECT_NEAR(forward.measures.derivatives[0][0], 4.2, 1e-13);
+  EXPECT_NEAR(forward.objectives.scaled[1][0], 2.0 / 2.2, 1e-13);  // an elasticity
+  EXPECT_NEAR(forward.objectives.scaled[2][1], 1.0, 1e-13);
+}
+
+TEST(LocalSensitivity, LeavesAFailedRunsColumnOutByName) {
+  FunctionEvaluator evaluator([](const ParameterSet& p) {
+    EvaluationResult result = evaluate(p);
+    if (p[1] == 1.0) return result;
+    result.measureValues = {kFailedRunValue, kFailedRunValue};
+    result.objectiveValues = result.measureValues;
+    result.failure = EvaluationFailure{EvaluationFailure::Kind::timedOut, "the batch ran out of time", {}};
+    return result;
+  });
+  const SearchSpace space = spaceOf({{kNone, 2, 0, 4}, {kNone, 1, 0, 10}, {kLog, 1, 0, 2}});
+  const LocalSensitivity result = localSensitivity({0, 0, 0.1}, space, evaluator);
+  EXPECT_TRUE(std::isnan(result.measures.derivatives[1][0]));
+  EXPECT_NEAR(result.measures.derivatives[0][0], 4.4, 1e-13);
+  EXPECT_THAT(result.ranking, ElementsAre(2, 0, 1));
+  const AnalysisNames names{space.names, {"bias", "peak"}, {"low", "high"}};
+  EXPECT_THAT(formatSensitivity(result, names),
+              Contains("Warning: Parameter p2 has no derivatives: evaluation 3 failed: the batch ran out of time"));
+  EXPECT_THAT(formatSensitivity(result, names), Contains("     3. p2                          NaN"));
+}
+
+TEST(LocalSensitivity, OfAFailedBaseSetHasCentralDerivativesOnly) {
+  FunctionEvaluator evaluator([](const ParameterSet& p) {
+    EvaluationResult result = evaluate(p);
+    if (p[0] == 2.0 && p[1] == 1.0) result.failure = EvaluationFailure{};
+    return result;
+  });
+  const SearchSpace space = spaceOf({{kNone, 2, 0, 4}, {kNone, 1, 1, 10}, {kLog, 1, 1, 1}});
+  const LocalSensitivity result = localSensitivity({1, 0, 0.1}, space, evaluator);
+  EXPECT_NEAR(result.measures.derivatives[0][0], 4.0, 1e-13);
+  EXPECT_TRUE(std::isnan(result.measures.derivatives[1][0]));  // one-sided at its bound
+  EXPECT_EQ(result.plan.differences[2].problem, "its bounds are equal");
+  EXPECT_TRUE(std::isnan(result.measures.scaled[0][0]));
+  EXPECT_FALSE(linearise(result.plan, std::vector<std::vector<double>>(4), std::vector<double>{1.0}, {}).has_value());
+}
+
+TEST(Linearise, LeavesTheColumnOfAFailedSetUnknown) {
+  const SearchSpace space = spaceOf({{kNone, 2, 0, 4}, {kNone, 1, 0, 10}});
+  const PerturbationPlan plan = planPerturbations({0, 0, 0.5}, space, space.initial);
+  const std::vector<std::vector<double>> simulated = {{1, 2}, {2, 6}, {}};
+  const auto model = linearise(plan, simulated, std::vector<double>{0.5, 2.5}, {1.0, 4.0});
+  ASSERT_TRUE(model.has_value());
+  EXPECT_THAT(model->residuals, ElementsAre(0.5, -0.5));
+  EXPECT_THAT(model->jacobian[0], ElementsAre(0.5, 2.0));
+  EXPECT_TRUE(std::isnan(model->jacobian[1][0]) && std::isnan(model->jacobian[1][1]));
+}
+
+}  // namespace
+}  // namespace mirevo

@@ -1,0 +1,104 @@
+#include "algorithms/analyses/uncertainty.h"
+
+#include <cmath>
+#include <set>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "algorithms/function_evaluator.h"
+#include "algorithms/numbers/uniform_generator.h"
+
+namespace mirevo {
+namespace {
+
+using testing::FunctionEvaluator;
+using testing::resultOf;
+
+double normalProbability(double z) {
+  return 0.5 * std::erfc(-z / std::sqrt(2.0));
+}
+
+TEST(UncertaintySample, DrawsColumnByColumnFromTheSeed) {
+  const UncertaintySettings settings{0, 3, {{10.0, 2.0}, {-1.0, 0.5}}};
+  const std::vector<ParameterSet> sample = uncertaintySample(settings, 5);
+  UniformGenerator random(5);
+  for (std::size_t j = 0; j < 2; ++j) {
+    for (std::size_t i = 0; i < 3; ++i) {
+      const double z = (sample[i][j] - settings.parameters[j].mean) / settings.parameters[j].standardDeviation;
+      EXPECT_NEAR(normalProbability(z), random.next(), 1e-14);
+    }
+  }
+  EXPECT_EQ(sample, uncertaintySample(settings, -5));
+  EXPECT_NE(sample, uncertaintySample(settings, 6));
+}
+
+TEST(UncertaintySample, LatinHypercubeHitsEachStratumOnceInRankOrder) {
+  for (const int n : {4, 1000}) {
+    const UncertaintySettings settings{1, n, {{0.0, 1.0}, {0.0, 1.0}, {3.0, 0.0}}};
+    const std::vector<ParameterSet> sample = uncertaintySample(settings, 17);
+    for (std::size_t j = 0; j < 2; ++j) {
+      std::set<int> strata;
+      for (const ParameterSet& set : sample) strata.insert(static_cast<int>(normalProbability(set[j]) * n));
+      EXPECT_EQ(strata.size(), n);
+    }
+    // The permutation ranks the deviates that simple random sampling would use.
+    const std::vector<ParameterSet> simple = uncertaintySample({0, n, {{0.0, 1.0}}}, 17);
+    for (std::size_t i = 1; i < sample.size(); ++i) {
+      EXPECT_EQ(sample[i][0] < sample[0][0], simple[i][0] < simple[0][0]) << i;
+      EXPECT_EQ(sample[i][2], 3.0);
+    }
+  }
+}
+
+TEST(UncertaintySample, HasTheMomentsItIsAskedFor) {
+  const std::vector<ParameterSet> sample = uncertaintySample({1, 2000, {{-4.0, 3.0}, {7.0, 0.1}}}, 1);
+  UncertaintyOutcome outcome{sample, {}};
+  const UncertaintySummary summary = summariseUncertainty(outcome);
+  EXPECT_NEAR(summary.parameters[0].mean, -4.0, 0.01);
+  EXPECT_NEAR(summary.parameters[0].standardDeviation, 3.0, 0.02);
+  EXPECT_NEAR(summary.parameters[1].quantiles[4], 7.0 + 0.1 * 1.6448536269514722, 1e-3);
+  EXPECT_LT(std::abs(summary.correlations[0][1]), 0.07);  // three standard errors
+}
+
+TEST(UncertaintyAnalysis, EvaluatesOneBatchAndLeavesFailuresOut) {
+  int call = 0;
+  FunctionEvaluator evaluator([&](const ParameterSet& set) {
+    EvaluationResult result = resultOf(++call <= 3 ? call : kFailedRunValue);
+    result.measureValues = {result.aggregate, set[0]};
+    if (call > 3) result.failure = EvaluationFailure{};
+    return result;
+  });
+  const UncertaintyOutcome outcome = uncertaintyAnalysis({0, 5, {{1.0, 0.0}}}, 1, evaluator);
+  ASSERT_EQ(evaluator.batches.size(), 1U);
+  EXPECT_EQ(evaluator.batches[0].size(), 5U);
+  const UncertaintySummary summary = summariseUncertainty(outcome);
+  EXPECT_EQ(summary.failedCount, 2U);
+  EXPECT_EQ(summary.objectives[0].count, 3U);
+  EXPECT_EQ(summary.objectives[0].mean, 2.0);
+  EXPECT_EQ(summary.objectives[0].standardDeviation, 1.0);
+  EXPECT_DOUBLE_EQ(summary.objectives[0].quantiles[0], 1.1);
+  EXPECT_EQ(summary.parameters[0].count, 5U);
+  EXPECT_THAT(
+      formatUncertainty(summary, {{"K"}, {"bias", "peak"}, {"low"}}),
+      ::testing::ElementsAre(
+          "Uncertainty analysis: 5 evaluations, 2 failed and left out of the statistics", "",
+          ::testing::HasSubstr("Parameter (search scale)"),
+          "   K                                     1              0              1              1              1"
+          "              1              1",
+          "", ::testing::HasSubstr("Std. deviation"), ::testing::HasSubstr("bias "), ::testing::HasSubstr("peak "), "",
+          ::testing::HasSubstr("95 %"),
+          "   low                             2              1            1.1            1.5              2"
+          "            2.5            2.9",
+          "", "   Sample correlation              K", "   K                               1"));
+}
+
+TEST(UncertaintyAnalysis, EvaluatesAnEmptyBatchWithoutParameters) {
+  FunctionEvaluator evaluator([](const ParameterSet&) { return resultOf(0.0); });
+  EXPECT_TRUE(uncertaintyAnalysis({0, 5, {}}, 1, evaluator).results.empty());
+  EXPECT_EQ(evaluator.batches.size(), 1U);
+  EXPECT_EQ(evaluator.evaluationCount, 0);
+}
+
+}  // namespace
+}  // namespace mirevo

@@ -1,0 +1,65 @@
+#include "algorithms/numbers/sample_summary.h"
+
+#include <algorithm>
+#include <cmath>
+#include <limits>
+
+#include <gtest/gtest.h>
+
+#include "algorithms/analyses/series_band.h"
+#include "algorithms/numbers/uniform_generator.h"
+
+namespace mirevo {
+namespace {
+
+constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
+
+TEST(SampleSummary, MatchesAWorkedExample) {
+  // 2 4 4 5 10 with values that do not count: mean 5, squares 9 + 1 + 1 + 0 + 25 = 36, 5 % at position 0.2.
+  const SampleSummary summary =
+      summariseSample(std::vector<double>{10, 4, kNaN, 2, 5, 4, std::numeric_limits<double>::infinity()});
+  EXPECT_EQ(summary.count, 5U);
+  EXPECT_EQ(summary.mean, 5.0);
+  EXPECT_EQ(summary.standardDeviation, 3.0);
+  const double expected[] = {2.4, 4.0, 4.0, 5.0, 9.0};
+  for (std::size_t k = 0; k < 5; ++k) EXPECT_DOUBLE_EQ(summary.quantiles[k], expected[k]) << k;
+}
+
+TEST(SampleSummary, SaysNaNWhereTheSampleIsTooSmall) {
+  EXPECT_TRUE(std::isnan(summariseSample({}).mean));
+  EXPECT_TRUE(std::isnan(summariseSample({}).quantiles[2]));
+  const SampleSummary one = summariseSample(std::vector<double>{3.0});
+  EXPECT_EQ(one.quantiles[0], 3.0);
+  EXPECT_TRUE(std::isnan(one.standardDeviation));
+}
+
+TEST(SampleCorrelation, MatchesAWorkedExampleAndRefusesConstants) {
+  const std::vector<std::vector<double>> rows = {{1, 2, 7}, {2, 1, 7}, {3, 4, 7}, {4, 3, 7}};
+  const auto matrix = correlationMatrix(rows);
+  EXPECT_DOUBLE_EQ(matrix[0][1], 0.6);
+  EXPECT_EQ(matrix[1][0], matrix[0][1]);
+  EXPECT_TRUE(std::isnan(matrix[0][2]));
+  EXPECT_EQ(matrix[2][2], 1.0);
+}
+
+TEST(SeriesBand, HasTheQuantilesOfWhatSucceededAndCountsTheObservationsInside) {
+  std::vector<EvaluationResult> results(102);
+  for (std::size_t i = 0; i < results.size(); ++i) {
+    if (i == 7) continue;                                                          // failed
+    const double value = static_cast<double>((37 * (i - (i > 7 ? 1 : 0))) % 101);  // 0 to 100, shuffled
+    results[i].simulatedValues = {-1.0, value, value, i == 0 ? kNaN : value, kNaN, -value};
+  }
+  const SeriesBand band = seriesBand(std::vector{5.0, 4.9, 50.0, 1.0, -95.0}, results, 1);
+  EXPECT_DOUBLE_EQ(band.lower[0], 5.0);
+  EXPECT_DOUBLE_EQ(band.median[0], 50.0);
+  EXPECT_DOUBLE_EQ(band.upper[0], 95.0);
+  EXPECT_DOUBLE_EQ(band.lower[2], 1.0 + 99.0 * 0.05);  // 1 to 100
+  EXPECT_TRUE(std::isnan(band.lower[3]) && std::isnan(band.median[3]) && std::isnan(band.upper[3]));
+  EXPECT_DOUBLE_EQ(band.lower[4], -95.0);
+  EXPECT_EQ(band.observationCount, 4U);
+  EXPECT_EQ(band.shareInside, 0.75);
+  EXPECT_TRUE(std::isnan(seriesBand(std::vector{1.0}, {}, 0).shareInside));
+}
+
+}  // namespace
+}  // namespace mirevo

@@ -1,0 +1,312 @@
+#include "algorithms/searches/population_search.h"
+
+#include <cmath>
+#include <limits>
+#include <map>
+#include <memory>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "algorithms/function_evaluator.h"
+#include "algorithms/searches/pse.h"
+#include "algorithms/searches/sce.h"
+#include "algorithms/surrogate/proposal_selector.h"
+#include "algorithms/test_functions.h"
+
+namespace mirevo {
+namespace {
+
+using testing::boundsOf;
+using testing::FunctionEvaluator;
+using testing::resultOf;
+
+enum class Kind { sce, pse };
+
+/// With the settings that are usual, or another number of evolution steps in a loop of SCE.
+std::unique_ptr<PopulationSearch> makeSearch(Kind kind, int complexes, const SearchProblem& problem, int steps = 0) {
+  const int n = static_cast<int>(problem.bounds.size());
+  const SimplexSettings simplex{n + 1};
+  if (steps == 0) steps = 2 * n + 1;
+  if (kind == Kind::sce) return std::make_unique<Sce>(SceSettings{complexes, 2 * n + 1, steps}, simplex, problem);
+  return std::make_unique<Pse>(PseSettings{complexes * (2 * n + 1)}, simplex, problem);
+}
+
+SearchSummary runToEnd(PopulationSearch& search) {
+  EXPECT_EQ(search.initialise(), kSearchOk);
+  for (int loop = 0; loop < 100000 && !search.isTerminated(); ++loop) EXPECT_EQ(search.advance(), kSearchOk);
+  EXPECT_TRUE(search.isTerminated());
+  return search.summary();
+}
+
+constexpr StoppingCriteria onBudget(int evaluations) {
+  return {evaluations, 1000000, 0.0};
+}
+
+class EitherSearch : public ::testing::TestWithParam<Kind> {};
+INSTANTIATE_TEST_SUITE_P(Searches, EitherSearch, ::testing::Values(Kind::sce, Kind::pse),
+                         [](const auto& instance) { return instance.param == Kind::sce ? "Sce" : "Pse"; });
+
+TEST_P(EitherSearch, FindsPublishedOptima) {
+  struct Problem {
+    std::string function;
+    int complexes;
+    int budget;
+    double tolerance;
+  };
+  for (const Problem& problem : {Problem{"Goldstein-Price 2-D", 4, 600, 1e-3}, Problem{"Rosenbrock 2-D", 8, 1800, 1e-3},
+                                 Problem{"Six-hump camel-back 2-D", 4, 600, 1e-3},
+                                 Problem{"Griewank 2-D", 8, 1800, 1e-3}, Problem{"Shekel 4-D", 8, 3500, 1e-3},
+                                 Problem{"Hartman 6-D", 8, 2500, 1e-3}, Problem{"Ackley 10-D", 4, 5000, 1e-3}}) {
+    for (const int seed : {1, 2, 3}) {
+      const auto function = testing::shifted(testing::testFunction(problem.function), seed);
+      testing::TargetEvaluator evaluator(function);
+      UniformGenerator random(seed);
+      const auto search = makeSearch(GetParam(), problem.complexes,
+                                     {boundsOf(function), onBudget(problem.budget), {}, {}, evaluator, random});
+      const SearchSummary summary = runToEnd(*search);
+      EXPECT_NEAR(summary.bestResult.aggregate, function.optimalValue, problem.tolerance)
+          << problem.function << ", seed " << seed;
+      EXPECT_EQ(function.value(summary.best), summary.bestResult.aggregate);
+    }
+  }
+}
+
+TEST_P(EitherSearch, KeepsToTheBudgetExactly) {
+  for (const int budget : {1, 3, 10, 11, 12, 13, 57, 200}) {
+    FunctionEvaluator evaluator([](const ParameterSet& x) { return resultOf(testing::rosenbrock(x)); });
+    UniformGenerator random(4);
+    const SearchBounds bounds{{-5, -2}, {5, 8}, {0, 0}};
+    const auto search = makeSearch(GetParam(), 2, {bounds, onBudget(budget), {}, {}, evaluator, random});
+    const SearchSummary summary = runToEnd(*search);
+    EXPECT_EQ(evaluator.evaluationCount, budget);
+    EXPECT_EQ(summary.evaluationCount, budget);
+    // A population of one has converged as well, and that test is the last one.
+    EXPECT_EQ(summary.terminationMessage, budget == 1
+                                              ? "Optimisation terminated: Population converged"
+                                              : "Optimisation terminated: Maximum number of model evaluations reached");
+    ASSERT_EQ(evaluator.settledSizes.size(), 1U);
+    EXPECT_EQ(evaluator.settledSizes.front(), std::min<std::size_t>(10, static_cast<std::size_t>(budget)));
+  }
+}
+
+TEST_P(EitherSearch, NeverLosesItsBestPointNorLeavesTheBounds) {
+  const SearchBounds bounds{{0, 0, 0}, {1, 2, 4}, {0, 1, 2}};
+  FunctionEvaluator evaluator([](const ParameterSet& x) { return resultOf(x[0] + (x[1] - 2) * (x[1] - 2) - x[2]); });
+  UniformGenerator random(9);
+  const auto search = makeSearch(GetParam(), 3, {bounds, onBudget(2000), {}, {}, evaluator, random});
+  ASSERT_EQ(search->initialise(), kSearchOk);
+  double best = search->population().front().value();
+  while (!search->isTerminated()) {
+    ASSERT_EQ(search->advance(), kSearchOk);
+    EXPECT_LE(search->population().front().value(), best);
+    best = search->population().front().value();
+    EXPECT_EQ(search->summary().bestResult.aggregate, best);
+  }
+  EXPECT_NEAR(best, -4.0, 1.0e-3);  // in a corner of the bounds
+  for (const auto& batch : evaluator.batches) {
+    for (const ParameterSet& set : batch) {
+      for (std::size_t j = 0; j < set.size(); ++j) {
+        ASSERT_GE(set[j], bounds.lower[j]);
+        ASSERT_LE(set[j], bounds.upper[j]);
+      }
+    }
+  }
+}
+
+TEST_P(EitherSearch, NeitherFixedParametersNorFailuresStallItOrMakeANotANumber) {
+  const double nan = std::numeric_limits<double>::quiet_NaN();
+  const std::vector<std::pair<std::string, FunctionEvaluator::Function>> functions{
+      {"smooth", [](const ParameterSet& x) { return resultOf(x[0] * x[0] + x[2] * x[2]); }},
+      {"constant", [](const ParameterSet&) { return resultOf(1.0); }},
+      {"half of it not a number", [nan](const ParameterSet& x) { return resultOf(x[0] < 0.3 ? nan : x[0]); }},
+      {"never a number", [nan](const ParameterSet&) { return resultOf(nan); }},
+      {"half of it failing",
+       [](const ParameterSet& x) {
+         EvaluationResult result = resultOf(x[2] < 0.5 ? kFailedRunValue : x[2]);
+         if (x[2] < 0.5) result.failure.emplace();
+         return result;
+       }},
+      {"all of it failing",
+       [](const ParameterSet&) {
+         EvaluationResult result = resultOf(kFailedRunValue);
+         result.failure.emplace();
+         return result;
+       }},
+      {"steps, as of integer parameters",
+       [](const ParameterSet& x) { return resultOf(std::abs(std::floor(4 * x[0])) + std::abs(std::floor(4 * x[2]))); }},
+  };
+  for (const auto& [name, function] : functions) {
+    for (const int modelType : {-1, 0, 1}) {  // without, and with a surrogate model
+      FunctionEvaluator evaluator(function);
+      UniformGenerator random(6);
+      const SearchBounds bounds{{-1, 0.1, -1}, {1, 0.1, 1}, {0.9, 0.1, 0.9}};
+      ProposalSelector selector({50, 20, modelType, 1}, bounds);
+      const int budget = modelType == 1 ? 200 : 1500;
+      const auto search =
+          makeSearch(GetParam(), 2,
+                     {bounds, {budget, 1000000, 0.0}, {}, {}, evaluator, random, modelType < 0 ? nullptr : &selector});
+      const SearchSummary summary = runToEnd(*search);
+      EXPECT_LE(summary.evaluationCount, budget) << name;
+      EXPECT_TRUE(std::isfinite(summary.populationRange)) << name;
+      EXPECT_TRUE(std::isfinite(summary.populationSpread)) << name;
+      for (const auto& batch : evaluator.batches) {
+        for (const ParameterSet& set : batch) {
+          ASSERT_EQ(set[1], 0.1) << name;
+          ASSERT_TRUE(std::abs(set[0]) <= 1.0 && std::abs(set[2]) <= 1.0) << name;
+        }
+      }
+      if (name == "steps, as of integer parameters") {
+        EXPECT_EQ(summary.bestResult.aggregate, 0.0) << modelType;
+      }
+    }
+  }
+}
+
+TEST_P(EitherSearch, StopsWhereNoParameterCanVary) {
+  FunctionEvaluator evaluator([](const ParameterSet&) { return resultOf(1.0); });
+  UniformGenerator random(1);
+  const auto search = makeSearch(GetParam(), 2, {{{2, 3}, {2, 3}, {2, 3}}, onBudget(500), {}, {}, evaluator, random});
+  EXPECT_EQ(runToEnd(*search).terminationMessage, "Optimisation terminated: Population converged");
+}
+
+TEST_P(EitherSearch, RefusesStepsAndSettingsThatMakeNoSense) {
+  FunctionEvaluator evaluator([](const ParameterSet&) { return resultOf(1.0); });
+  UniformGenerator random(1);
+  const auto status = [&](SearchBounds bounds, int budget) {
+    const auto search = makeSearch(GetParam(), 2, {std::move(bounds), onBudget(budget), {}, {}, evaluator, random});
+    EXPECT_EQ(search->advance(), kSearchNotInitialised);
+    return search->initialise();
+  };
+  EXPECT_EQ(status({{0}, {1}, {0}}, 0), kSearchSettingsInvalid);
+  EXPECT_EQ(status({{1}, {0}, {0}}, 9), kSearchSettingsInvalid);
+  EXPECT_EQ(status({{0}, {std::numeric_limits<double>::infinity()}, {0}}, 9), kSearchSettingsInvalid);
+  EXPECT_EQ(status({{}, {}, {}}, 9), kSearchSettingsInvalid);
+  EXPECT_EQ(evaluator.evaluationCount, 0);
+}
+
+TEST_P(EitherSearch, IsHelpedByTheSurrogateModelWithinTheSameBudgetAndRules) {
+  const SearchBounds bounds{{-5, -2}, {5, 8}, {0, 0}};
+  std::map<int, int> successes;  // of ten seeds, by type; -1 alone
+  for (const int type : {-1, 0, 1}) {
+    for (int seed = 1; seed <= 10; ++seed) {
+      FunctionEvaluator evaluator([](const ParameterSet& x) { return resultOf(testing::rosenbrock(x)); });
+      UniformGenerator random(seed);
+      ProposalSelector selector({25, 0, type, 1}, bounds);
+      const auto search =
+          makeSearch(GetParam(), 4, {bounds, onBudget(400), {}, {}, evaluator, random, type < 0 ? nullptr : &selector});
+      const SearchSummary summary = runToEnd(*search);
+      EXPECT_LE(evaluator.evaluationCount, 400);
+      // What is reported was run, never predicted.
+      EXPECT_EQ(summary.bestResult.aggregate, testing::rosenbrock(summary.best));
+      successes[type] += summary.bestResult.aggregate < 1.0e-3 ? 1 : 0;
+    }
+  }
+  EXPECT_GE(successes[0], successes[-1] + 3);
+  EXPECT_GE(successes[1], successes[-1] + 3);
+}
+
+TEST_P(EitherSearch, PutsAPredictedMinimumInThePlaceOfThePointThatItRefines) {
+  const SearchBounds bounds{{-5, -5}, {5, 5}, {0, 0}};
+  const auto bowl = [](const ParameterSet& x) { return 1.0 + (x[0] - 1) * (x[0] - 1) + 2 * (x[1] + 2) * (x[1] + 2); };
+  FunctionEvaluator evaluator([&bowl](const ParameterSet& x) { return resultOf(bowl(x)); });
+  UniformGenerator random(2);
+  ProposalSelector selector({25, 0, 0, 1}, bounds);  // of the polynomial, whose minimum is the function's
+  const auto search = makeSearch(GetParam(), 2, {bounds, onBudget(200), {}, {}, evaluator, random, &selector}, 1);
+  ASSERT_EQ(search->initialise(), kSearchOk);
+  ASSERT_EQ(search->advance(), kSearchOk);
+  const Individual before = search->population().front();
+  ASSERT_GT(before.value(), 1.01);
+  ASSERT_EQ(search->advance(), kSearchOk);
+  EXPECT_LT(search->population().front().value(), 1.0001);
+  for (const Individual& point : search->population()) EXPECT_NE(point.set, before.set);
+}
+
+/// A problem whose sample is (5, 5), (6, 5), (5, 7).
+SearchProblem fromThreePoints(Evaluator& evaluator, UniformGenerator& random) {
+  InitialSampleSettings fromFile;
+  fromFile.includeInitialParameters = false;
+  fromFile.generation = 4;
+  return {{{0, 0}, {20, 20}, {0, 0}}, onBudget(100), fromFile, {{5, 5}, {6, 5}, {5, 7}}, evaluator, random};
+}
+
+/// One evolution step of one complex: a plane, so that the reflection is always better than the worst point.
+TEST(Sce, ReflectsTheWorstPointOfTheSubcomplexFirst) {
+  FunctionEvaluator evaluator([](const ParameterSet& x) { return resultOf(x[0] + x[1]); });
+  UniformGenerator random(1);
+  Sce sce({1, 3, 1}, {3}, fromThreePoints(evaluator, random));
+  ASSERT_EQ(sce.initialise(), kSearchOk);
+  ASSERT_EQ(sce.advance(), kSearchOk);
+  // g = (5.5, 5), u = (5, 7), a = 1 for two parameters: 2g − u = (6, 3).
+  ASSERT_EQ(evaluator.batches.size(), 2U);
+  EXPECT_EQ(evaluator.batches[1], (std::vector<ParameterSet>{{6, 3}}));
+  EXPECT_EQ(sce.population().front().set, (ParameterSet{6, 3}));
+}
+
+TEST(Sce, ContractsWhereTheReflectionIsNoBetterAndElseTakesARandomPoint) {
+  // Every new point is worse than the three of the sample.
+  int count = 0;
+  FunctionEvaluator counting([&count](const ParameterSet&) { return resultOf(++count); });
+  UniformGenerator random(1);
+  Sce sce({1, 3, 1}, {3}, fromThreePoints(counting, random));
+  ASSERT_EQ(sce.initialise(), kSearchOk);
+  ASSERT_EQ(sce.advance(), kSearchOk);
+  ASSERT_EQ(counting.batches.size(), 4U);
+  EXPECT_THAT(counting.batches[1][0], ::testing::ElementsAre(6, 3));
+  // g + 0.4·(u − g)
+  EXPECT_THAT(counting.batches[2][0], ::testing::ElementsAre(::testing::DoubleEq(5.3), ::testing::DoubleEq(5.8)));
+  EXPECT_EQ(sce.population().back().set, counting.batches[3][0]);
+  EXPECT_THAT(counting.batches[3][0], ::testing::ElementsAre(::testing::AllOf(::testing::Ge(5), ::testing::Le(6)),
+                                                             ::testing::AllOf(::testing::Ge(5), ::testing::Le(7))));
+}
+
+TEST(Sce, RunsOneProposalOfEveryComplexAtATime) {
+  FunctionEvaluator evaluator([](const ParameterSet& x) { return resultOf(testing::rosenbrock(x)); });
+  UniformGenerator random(3);
+  Sce sce({6, 5, 5}, {3}, {{{-5, -2}, {5, 8}, {0, 0}}, onBudget(100000), {}, {}, evaluator, random});
+  ASSERT_EQ(sce.initialise(), kSearchOk);
+  ASSERT_EQ(sce.advance(), kSearchOk);
+  ASSERT_GE(evaluator.batches.size(), 6U);
+  EXPECT_EQ(evaluator.batches[0].size(), 30U);
+  EXPECT_EQ(evaluator.batches[1].size(), 6U);
+}
+
+TEST(Pse, RunsAGenerationInOneBatchAndKeepsItsBestPoint) {
+  FunctionEvaluator evaluator([](const ParameterSet& x) { return resultOf(testing::rosenbrock(x)); });
+  UniformGenerator random(3);
+  PseSettings onlyMutations{22, 0.0, 0.0};
+  Pse pse(onlyMutations, {3}, {{{-5, -2}, {5, 8}, {0, 0}}, onBudget(100), {}, {}, evaluator, random});
+  ASSERT_EQ(pse.initialise(), kSearchOk);
+  double best = pse.population().front().value();
+  while (!pse.isTerminated()) {
+    ASSERT_EQ(pse.advance(), kSearchOk);
+    EXPECT_LE(pse.population().front().value(), best);
+    best = pse.population().front().value();
+  }
+  std::vector<std::size_t> sizes;
+  for (const auto& batch : evaluator.batches) sizes.push_back(batch.size());
+  EXPECT_THAT(sizes, ::testing::ElementsAre(22, 22, 22, 22, 12));
+}
+
+/// Every new point is worse than the sample, so that the step of the worst point goes on from move to move.
+TEST(Pse, ReflectsThenContractsAndGivesAStuckPointUp) {
+  int count = 0;
+  FunctionEvaluator counting([&count](const ParameterSet&) { return resultOf(++count); });
+  UniformGenerator random(1);
+  Pse pse({3, 1.0, 0.0}, {3}, fromThreePoints(counting, random));
+  ASSERT_EQ(pse.initialise(), kSearchOk);
+  for (int loop = 0; loop < 3; ++loop) ASSERT_EQ(pse.advance(), kSearchOk);
+  // The best point stays; its turn goes to the worst one, whose offspring are the last two of a batch.
+  ASSERT_EQ(counting.batches.size(), 4U);
+  const ParameterSet reflected{5.5 + 1.1 * 0.5, 5 - 1.1 * 2};
+  const ParameterSet contracted{5.5 - 0.4 * 0.5, 5 + 0.4 * 2};
+  for (const std::size_t offspring : {1U, 2U}) {
+    EXPECT_THAT(counting.batches[1][offspring], ::testing::Pointwise(::testing::DoubleEq(), reflected));
+    EXPECT_THAT(counting.batches[2][offspring], ::testing::Pointwise(::testing::DoubleEq(), contracted));
+  }
+  EXPECT_THAT(pse.population().back().set, ::testing::Not(::testing::ElementsAre(5, 7)));
+  EXPECT_THAT(pse.population().front().set, ::testing::ElementsAre(5, 5));
+}
+
+}  // namespace
+}  // namespace mirevo

@@ -1,0 +1,266 @@
+#include "algorithms/surrogate/surrogate_model.h"
+
+#include <cmath>
+#include <limits>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "algorithms/numbers/latin_hypercube.h"
+#include "algorithms/surrogate/gaussian_process.h"
+#include "algorithms/surrogate/proposal_selector.h"
+#include "algorithms/surrogate/quadratic_surrogate.h"
+#include "algorithms/surrogate/quasi_newton.h"
+
+namespace mirevo {
+namespace {
+
+using Function = double (*)(const std::vector<double>&);
+
+std::vector<double> valuesOf(const UnitPoints& points, Function function) {
+  std::vector<double> values;
+  for (const auto& point : points) values.push_back(function(point));
+  return values;
+}
+
+double quadratic(const std::vector<double>& x) {
+  return 3.0 + x[0] - 2.0 * x[1] * x[2] + 5.0 * x[2] * x[2];
+}
+double wave(const std::vector<double>& x) {
+  return std::sin(5.0 * x[0]) + 0.01 * x[1];
+}
+
+TEST(QuadraticSurrogate, ReproducesAQuadraticPolynomial) {
+  UniformGenerator random(1);
+  const UnitPoints points = latinHypercube(30, 3, random);
+  QuadraticSurrogate model;
+  ASSERT_TRUE(model.fit(points, valuesOf(points, quadratic)));
+  for (const auto& point : latinHypercube(10, 3, random)) EXPECT_NEAR(model.predict(point), quadratic(point), 1.0e-5);
+}
+
+TEST(QuadraticSurrogate, StaysFiniteWhereThePointsDoNotDetermineIt) {
+  QuadraticSurrogate model;
+  EXPECT_FALSE(model.fit({}, {}));
+  const UnitPoints same(4, {0.5, 0.5});
+  ASSERT_TRUE(model.fit(same, std::vector<double>{1, 1, 1, 1}));
+  EXPECT_NEAR(model.predict(std::vector<double>{0.7, 0.2}), 1.0, 1.0e-6);
+  const UnitPoints line{{0.0, 0.3}, {0.5, 0.3}, {1.0, 0.3}};
+  ASSERT_TRUE(model.fit(line, std::vector<double>{0, 1, 2}));
+  EXPECT_NEAR(model.predict(line[1]), 1.0, 1.0e-3);
+}
+
+TEST(GaussianProcess, LearnsAWaveAndThatACoordinateHardlyMatters) {
+  UniformGenerator random(2);
+  const UnitPoints points = latinHypercube(40, 2, random);
+  GaussianProcess model;
+  ASSERT_TRUE(model.fit(points, valuesOf(points, wave)));
+  for (const auto& point : latinHypercube(10, 2, random)) EXPECT_NEAR(model.predict(point), wave(point), 0.02);
+  EXPECT_GT(model.lengths()[1], 3.0 * model.lengths()[0]);
+}
+
+TEST(GaussianProcess, TakesACoordinateThatDoesNotVaryAsOneThatDoesNotMatter) {
+  GaussianProcess model;
+  UnitPoints points;
+  for (int i = 0; i < 12; ++i) points.push_back({0.5, i / 12.0});
+  const auto exponential = [](const std::vector<double>& x) { return std::exp(3.0 * x[1]); };
+  ASSERT_TRUE(model.fit(points, valuesOf(points, exponential)));
+  EXPECT_NEAR(model.predict(std::vector<double>{0.7, 0.3}), exponential({0.5, 0.3}), 0.1);
+}
+
+TEST(GaussianProcess, IsNotHeldWhereAnEarlierFitHasEnded) {
+  UniformGenerator random(4);
+  const UnitPoints points = latinHypercube(40, 2, random);
+  GaussianProcess model;
+  UnitPoints narrow = points;
+  for (auto& point : narrow) point = {0.5 + 1.0e-5 * point[0], 0.5 + 1.0e-5 * point[1]};
+  std::vector<double> noise;
+  for (std::size_t i = 0; i < narrow.size(); ++i) noise.push_back(random.next());
+  ASSERT_TRUE(model.fit(narrow, noise));
+  ASSERT_TRUE(model.fit(points, valuesOf(points, wave)));
+  for (const auto& point : latinHypercube(10, 2, random)) EXPECT_NEAR(model.predict(point), wave(point), 0.02);
+}
+
+TEST(GaussianProcess, KnowsTheSlopeOfItsDeviance) {
+  UniformGenerator random(3);
+  const UnitPoints points = latinHypercube(25, 3, random);
+  GaussianProcess model;
+  ASSERT_TRUE(model.fit(points, valuesOf(points, quadratic)));
+  const std::vector<double> at{-1.0, 0.5, -0.3, -6.0};
+  ASSERT_TRUE(std::isfinite(model.deviance(at)));
+  const std::vector<double> slope = model.devianceSlope();
+  for (std::size_t k = 0; k < at.size(); ++k) {
+    std::vector<double> above = at;
+    std::vector<double> below = at;
+    above[k] += 1.0e-4;
+    below[k] -= 1.0e-4;
+    const double difference = (model.deviance(above) - model.deviance(below)) / 2.0e-4;
+    EXPECT_NEAR(slope[k], difference, 1.0e-4 * (1.0 + std::abs(difference))) << k;
+  }
+}
+
+TEST(QuasiNewtonSearch, GoesDownAValleyAndStopsAtABound) {
+  std::vector<double> last;
+  const SmoothFunction function{[&last](const std::vector<double>& x) {
+                                  last = x;
+                                  const double a = x[1] - x[0] * x[0];
+                                  return 100.0 * a * a + (1.0 - x[0]) * (1.0 - x[0]);
+                                },
+                                [&last] {
+                                  const double a = last[1] - last[0] * last[0];
+                                  return std::vector<double>{-400.0 * a * last[0] - 2.0 * (1.0 - last[0]), 200.0 * a};
+                                }};
+  const LowPoint free = quasiNewtonSearch(function, {-1.2, 1.0}, {{-5, -5}, {5, 5}}, {0.5, 1.0e-12, 100});
+  EXPECT_LT(free.value, 1.0e-6);
+  const LowPoint bounded = quasiNewtonSearch(function, {-1.2, 1.0}, {{-5, -5}, {0.5, 5}}, {0.5, 1.0e-12, 100});
+  EXPECT_THAT(bounded.point, testing::ElementsAre(0.5, testing::DoubleNear(0.25, 1.0e-6)));
+  // From the bound itself, where each coordinate's slope depends on the other's value.
+  const LowPoint held = quasiNewtonSearch(function, {0.5, 4.0}, {{-5, -5}, {0.5, 5}}, {0.5, 1.0e-12, 100});
+  EXPECT_THAT(held.point, testing::ElementsAre(0.5, testing::DoubleNear(0.25, 1.0e-6)));
+}
+
+TEST(QuasiNewtonSearch, ComesBackFromWhereItsLastMovesFailed) {
+  std::vector<double> last;
+  const SmoothFunction wall{[&last](const std::vector<double>& x) {
+                              last = x;
+                              return x[0] < 0.3 ? std::numeric_limits<double>::infinity() : x[0];
+                            },
+                            [] { return std::vector<double>{1.0}; }};
+  const LowPoint found = quasiNewtonSearch(wall, {1.0}, {{-5}, {5}}, {0.5, 0.0, 100});
+  EXPECT_NEAR(found.value, 0.3, 0.01);
+  EXPECT_EQ(last, found.point);
+}
+
+TEST(GaussianProcess, RefusesOrSurvivesDegeneratePoints) {
+  GaussianProcess model;
+  EXPECT_FALSE(model.fit(UnitPoints(1, {0.5}), std::vector<double>{1}));
+  EXPECT_FALSE(model.fit(UnitPoints{{0.1}, {0.9}}, std::vector<double>{1, 1}));  // constant: nothing to learn
+  const UnitPoints twins{{0.1}, {0.1}, {0.9}, {0.5}};
+  ASSERT_TRUE(model.fit(twins, std::vector<double>{1, 1.1, 3, 2}));
+  EXPECT_TRUE(std::isfinite(model.predict(std::vector<double>{0.3})));
+}
+
+TEST(ProposalSelector, RanksByPredictionAndLeavesFailuresOut) {
+  const SearchBounds bounds{{-10}, {10}, {0}};
+  for (const int type : {0, 1}) {
+    ProposalSelector selector({40, 100, type, 2}, bounds);
+    EXPECT_EQ(selector.proposalsPerRun(), 3U);
+    for (int i = -5; i <= 5; ++i) {
+      EvaluationResult result;
+      result.aggregate = (i - 2.0) * (i - 2.0);
+      if (i == 2) result.failure.emplace();
+      if (i == 2) result.aggregate = kFailedRunValue;
+      selector.note({static_cast<double>(i)}, result);
+    }
+    EXPECT_FALSE(selector.isActive(1));
+    EXPECT_TRUE(selector.isActive(2));
+    const std::vector<ParameterSet> proposals{{-4.5}, {2.6}, {0.5}, {3.5}, {7}};
+    EXPECT_THAT(selector.select(proposals, 2), testing::ElementsAre(1, 3)) << type;
+    EXPECT_THAT(selector.select(proposals, 9), testing::ElementsAre(0, 1, 2, 3, 4)) << type;
+  }
+}
+
+TEST(ProposalSelector, FindsTheModelsMinimumInItsNeighbourhoodOnce) {
+  const SearchBounds bounds{{-10, 3, -10}, {10, 3, 10}, {0, 3, 0}};
+  const auto at = [](double x, double y) {
+    EvaluationResult result;
+    result.aggregate = (x - 2.0) * (x - 2.0) + (x - 2.0) * (y + 1.0) + 3.0 * (y + 1.0) * (y + 1.0);
+    return result;
+  };
+  for (const int type : {0, 1}) {
+    ProposalSelector selector({50, 30, type, 1}, bounds);
+    EXPECT_TRUE(selector.minima(std::vector<ParameterSet>{{0, 3, 0}}).empty());
+    UniformGenerator random(5);
+    for (const auto& point : latinHypercube(30, 2, random)) {
+      const double x = 12.0 * point[0] - 6.0;
+      const double y = 12.0 * point[1] - 6.0;
+      selector.note({x, 3, y}, at(x, y));
+    }
+    for (int i = 0; i < 40; ++i) selector.note({1, 3, 1}, at(1, 1));  // must not crowd the others out
+    const std::vector<ParameterSet> centres(3, {0, 3, 0});
+    const std::vector<PredictedMinimum> minima = selector.minima(centres);
+    ASSERT_FALSE(minima.empty());
+    EXPECT_EQ(minima.size(), 1u) << "one place for all centres";
+    EXPECT_EQ(minima.front().centre, 0u);
+    const ParameterSet found = minima.front().set;
+    EXPECT_THAT(found, testing::ElementsAre(testing::DoubleNear(2.0, 0.1), 3.0, testing::DoubleNear(-1.0, 0.1)));
+    selector.note(found, at(found[0], found[2]));
+    // The polynomial is exact, so that its minimum stays there.
+    if (type == 0) {
+      EXPECT_TRUE(selector.minima(std::vector<ParameterSet>{found}).empty());
+    }
+  }
+}
+
+TEST(ProposalSelector, MovesAnIntegerParameterOfFewValuesEitherWay) {
+  for (const int type : {0, 1}) {
+    for (const int values : {2, 3}) {
+      for (const int wanted : {0, values - 1}) {
+        SCOPED_TRACE(testing::Message() << "type " << type << ", " << values << " values, wanted " << wanted);
+        const SearchBounds bounds{{0, 0}, {static_cast<double>(values), 1}, {0, 0}, {true, false}};
+        ProposalSelector selector({25, 18, type, 1}, bounds);
+        UniformGenerator random(1);
+        for (const auto& point : latinHypercube(18, 2, random)) {
+          const ParameterSet set{values * point[0], point[1]};
+          EvaluationResult result;
+          result.aggregate = 10.0 * std::abs(std::floor(set[0]) - wanted) + (set[1] - 0.3) * (set[1] - 0.3);
+          selector.note(set, result);
+        }
+        const std::vector<PredictedMinimum> minima =
+            selector.minima(std::vector<ParameterSet>{{values - 1.0 - wanted + 0.2, 0.8}});
+        ASSERT_EQ(minima.size(), 1u);
+        EXPECT_EQ(std::floor(minima.front().set[0]), wanted);
+      }
+    }
+  }
+}
+
+TEST(ProposalSelector, StaysAwayFromWhereARunFailed) {
+  const SearchBounds bounds{{1, 1}, {13, 13}, {1, 1}, {true, false}};
+  ProposalSelector selector({25, 0, 0, 1}, bounds);
+  const auto note = [&selector](double x, double y) {
+    EvaluationResult result;
+    result.aggregate = (std::floor(x) - 7) * (std::floor(x) - 7) + (y - 5) * (y - 5);
+    if (std::floor(x) == 7 && std::abs(y - 5) < 0.5) result.failure.emplace();
+    selector.note({x, y}, result);
+  };
+  for (double x = 2; x <= 12; x += 2) {
+    for (double y = 2; y <= 12; y += 2) note(x, y);
+  }
+  const std::vector<ParameterSet> centre{{6, 6}};
+  ASSERT_EQ(selector.minima(centre).size(), 1u);
+  note(7.5, 5.0);
+  for (const PredictedMinimum& minimum : selector.minima(centre)) {
+    EXPECT_TRUE(std::floor(minimum.set[0]) != 7 || std::abs(minimum.set[1] - 5) > 0.99) << minimum.set[1];
+  }
+  // The failed one itself, one that is nearer to it than to any other, and one far away.
+  const std::vector<ParameterSet> proposals{{7.1, 5.0}, {7.9, 5.4}, {11, 1}};
+  EXPECT_THAT(selector.select(proposals, 1), testing::ElementsAre(2));
+  EXPECT_THAT(selector.select(std::span(proposals).first(2), 1), testing::ElementsAre(1));
+}
+
+TEST(ProposalSelector, TakesIntegerParametersAsTheModelDoes) {
+  const SearchBounds bounds{{1, 0}, {7, 1}, {1, 0}, {true, false}};
+  for (const int type : {0, 1}) {
+    ProposalSelector selector({25, 0, type, 1}, bounds);
+    const auto note = [&](double x, double y) {
+      EvaluationResult result;
+      result.aggregate = std::abs(std::floor(x) - 4.0) + y * y;
+      selector.note({x, y}, result);
+    };
+    for (const double x : {1.2, 1.7, 2.5, 3.0, 3.9, 5.1, 6.3, 6.6}) {
+      for (const double y : {0.0, 0.4, 0.9}) note(x, y);
+    }
+    const std::vector<PredictedMinimum> minima = selector.minima(std::vector<ParameterSet>{{3.1, 0.4}});
+    ASSERT_EQ(minima.size(), 1u) << type;
+    EXPECT_EQ(std::floor(minima.front().set[0]), 4.0) << type;
+    // The first makes the run of (5.1, 0) again.
+    EXPECT_THAT(selector.select(std::vector<ParameterSet>{{5.9, 0.0}, {6.2, 0.8}}, 1), testing::ElementsAre(1)) << type;
+    note(minima.front().set[0], minima.front().set[1]);
+    for (const PredictedMinimum& next : selector.minima(std::vector<ParameterSet>{{4.9, 0.0}})) {
+      EXPECT_NE(next.set, minima.front().set) << type;
+    }
+  }
+}
+
+}  // namespace
+}  // namespace mirevo

@@ -1,0 +1,406 @@
+#include "platform/processes/posix_process_launcher.h"
+
+#include <chrono>
+#include <csignal>
+#include <fcntl.h>
+#include <functional>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "platform/processes/process_folder.h"
+#include "processes.h"
+#include "temporary_folder.h"
+
+namespace mirevo {
+namespace {
+
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::IsEmpty;
+using Clock = std::chrono::steady_clock;
+
+double secondsSince(Clock::time_point start) {
+  return std::chrono::duration<double>(Clock::now() - start).count();
+}
+
+class PosixProcessLauncherTest : public testing::Test {
+ protected:
+  PosixProcessLauncherTest() {
+    settings_.baseFolder = folder_ / "base";
+    settings_.processFolderPrefix = folder_ / "run_Process";
+    folder_.write("base/parameters.txt", "a = 3\n");
+  }
+
+  void addItem(const std::string& name, const std::string& arguments = "") {
+    settings_.batchItems.push_back({settings_.baseFolder + "/" + name, arguments});
+  }
+  /// A batch item that runs the test model with these options.
+  void addModel(const std::string& options, const std::string& name = "run.sh") {
+    folder_.write("base/" + name, "#!/bin/sh\nexec " MIREVO_TEST_MODEL " " + options + "\n", 0755);
+    addItem(name);
+  }
+  void initialise() { ASSERT_TRUE(launcher_.initialise(settings_)) << launcher_.lastError(); }
+
+  BatchStatus finish(int slot) {
+    std::int32_t executing = 1;
+    std::int32_t status = -1;
+    const auto start = Clock::now();
+    while (true) {
+      launcher_.isExecuting(slot, executing, status);
+      if (executing == 0) return static_cast<BatchStatus>(status);
+      if (secondsSince(start) > 60) throw std::runtime_error("the batch does not end");
+      launcher_.waitForChange(3.0);
+    }
+  }
+  BatchStatus run() {
+    launcher_.createProcesses(1);
+    return finish(1);
+  }
+  bool hasContent(const std::string& name) const { return folder_.exists(name) && !folder_.read(name).empty(); }
+  std::string read(const std::string& name) const { return folder_.read("run_Process1/" + name); }
+
+  TemporaryFolder folder_;
+  LauncherSettings settings_;
+  double now_ = 0.0;  ///< the launcher's clock, which the test moves
+  PosixProcessLauncher launcher_{[this] { return now_; }};
+};
+
+TEST_F(PosixProcessLauncherTest, EndsAreToldApart) {
+  const struct {
+    const char* script;  // empty: no file
+    unsigned mode;
+    BatchFailure::Kind kind;
+    int code;
+    const char* detail;
+  } cases[] = {
+      {"#!/bin/sh\nexit 0\n", 0755, BatchFailure::Kind::none, 0, ""},
+      {"echo no first line with an interpreter\n", 0755, BatchFailure::Kind::none, 0, ""},
+      {"echo no run bit; exit 4\n", 0644, BatchFailure::Kind::exitCode, 4, "run.sh exited with code 4"},
+      {"#!/bin/sh\nkill -SEGV $$\n", 0755, BatchFailure::Kind::signal, SIGSEGV,
+       "run.sh was ended by signal 11 (Segmentation fault)"},
+      {"", 0, BatchFailure::Kind::couldNotStart, ENOENT, "run.sh could not be started: No such file or directory"},
+      {"#!/no/such/shell -x\n", 0755, BatchFailure::Kind::couldNotStart, ENOENT,
+       "run.sh could not be started: No such file or directory; its first line asks for \"/no/such/shell -x\""},
+      {"#!/bin/sh\r\nexit 0\r\n", 0755, BatchFailure::Kind::couldNotStart, ENOENT,
+       "run.sh could not be started: No such file or directory; its first line asks for \"/bin/sh\" and ends in a "
+       "carriage return: save it with LF line ends"},
+  };
+  addItem("run.sh");
+  for (const auto& c : cases) {
+    std::filesystem::remove(folder_ / "base/run.sh");
+    if (*c.script != '\0') folder_.write("base/run.sh", c.script, c.mode);
+    initialise();
+    const BatchStatus status = run();
+    const BatchFailure failure = launcher_.failure(1);
+    EXPECT_EQ(status, c.kind == BatchFailure::Kind::none ? BatchStatus::succeeded : BatchStatus::failed) << c.script;
+    EXPECT_EQ(failure.kind, c.kind) << c.script;
+    EXPECT_EQ(failure.code, c.code) << c.script;
+    EXPECT_EQ(failure.detail, c.detail);
+  }
+}
+
+TEST_F(PosixProcessLauncherTest, GivesTheBatchAPlainSurrounding) {
+  // What this process happens to have set must not reach the model.
+  const int leaked = ::open("/dev/null", O_RDONLY);
+  sigset_t blocked;
+  sigemptyset(&blocked);
+  sigaddset(&blocked, SIGUSR1);
+  sigprocmask(SIG_BLOCK, &blocked, nullptr);
+  ::signal(SIGUSR2, SIG_IGN);
+  folder_.write("base/in/run.sh",
+                "#!/bin/sh\npwd\nfor word in \"$@\"; do echo \"[$word]\"; done\nreadlink /proc/self/fd/0\n"
+                "ls /proc/self/fd | wc -l\ngrep -E 'Sig(Blk|Ign)' /proc/self/status\n"
+                "echo $OMP_NUM_THREADS $OPENBLAS_NUM_THREADS $MKL_NUM_THREADS $MIREVO_TEST_PLAIN\n"
+                "ps -o pgid= -p $$ | tr -d ' ' >group.txt; echo $$ >>group.txt\necho error >&2\n",
+                0755);
+  ::setenv("OMP_NUM_THREADS", "8", 1);
+  ::setenv("MIREVO_TEST_PLAIN", "kept", 1);
+  settings_.useSingleThread = true;
+  addItem("in/run.sh", "-x 'two words' \"\"");
+  initialise();
+  EXPECT_EQ(run(), BatchStatus::succeeded);
+  ::close(leaked);
+  sigprocmask(SIG_UNBLOCK, &blocked, nullptr);
+  ::signal(SIGUSR2, SIG_DFL);
+
+  const std::string inFolder = folder_ / "run_Process1/in";
+  EXPECT_EQ(read(kBatchLogName), inFolder +
+                                     "\n[-x]\n[two words]\n[]\n/dev/null\n4\nSigBlk:\t0000000000000000\n"
+                                     "SigIgn:\t0000000000000000\n1 1 1 kept\nerror\n");
+  const std::string ids = read("in/group.txt");  // the group, then the process: one and the same
+  EXPECT_EQ(ids.substr(0, ids.find('\n')) + "\n", ids.substr(ids.find('\n') + 1));
+}
+
+// Some job starters leave SIGCHLD ignored; the kernel then reaps children itself.
+TEST_F(PosixProcessLauncherTest, ExitCodesAreKnownWhereChildrenAreIgnored) {
+  folder_.write("base/run.sh", "exit 6\n");
+  addItem("run.sh");
+  ::signal(SIGCHLD, SIG_IGN);
+  initialise();
+  EXPECT_EQ(run(), BatchStatus::failed);
+  EXPECT_EQ(launcher_.failure(1).code, 6);
+  ::signal(SIGCHLD, SIG_IGN);  // and by something that this program uses, while it runs
+  EXPECT_EQ(run(), BatchStatus::failed);
+  EXPECT_EQ(launcher_.failure(1).detail, "run.sh has ended, but how could not be learned");
+  ::signal(SIGCHLD, SIG_DFL);
+}
+
+TEST_F(PosixProcessLauncherTest, ItemsRunOneAfterAnotherUntilOneFails) {
+  folder_.write("base/first.sh", "echo first; sleep 0.05; echo one >order.txt\n");
+  folder_.write("base/second.sh", "echo second; echo two >>order.txt; exit $1\n");
+  folder_.write("base/third.sh", "echo third\n");
+  addItem("first.sh");
+  addItem("second.sh", "7");
+  addItem("third.sh");
+  initialise();
+  EXPECT_EQ(run(), BatchStatus::failed);
+  EXPECT_EQ(launcher_.failure(1).detail, "second.sh exited with code 7");
+  EXPECT_EQ(read("order.txt"), "one\ntwo\n");
+  EXPECT_THAT(launcher_.lastOutput(1, 20), ElementsAre("first", "second"));
+}
+
+TEST_F(PosixProcessLauncherTest, KeepsTheOutputOfTheLastRunAlone) {
+  folder_.write("base/run.sh", "cat words.txt\n");
+  folder_.write("base/words.txt", "");
+  addItem("run.sh");
+  initialise();
+  for (const std::string words : {"one\ntwo\n", "", "\x1b[1mbold\x1b[0m\r\n", "end without line end"}) {
+    folder_.write("run_Process1/words.txt", words);
+    EXPECT_EQ(run(), BatchStatus::succeeded);
+    EXPECT_EQ(read(kBatchLogName), words);
+  }
+  EXPECT_THAT(launcher_.lastOutput(1, 5), ElementsAre("end without line end"));
+  // A batch that clears its folder before it works, as many do, leaves its log readable.
+  folder_.write("run_Process1/run.sh", "rm -f " + std::string(kBatchLogName) + "; echo said\n");
+  EXPECT_EQ(run(), BatchStatus::succeeded);
+  EXPECT_THAT(launcher_.lastOutput(1, 5), ElementsAre("said"));
+  folder_.write("run_Process1/run.sh", "echo again\n");
+  EXPECT_EQ(run(), BatchStatus::succeeded);
+  EXPECT_EQ(read(kBatchLogName), "again\n");
+}
+
+TEST_F(PosixProcessLauncherTest, MegabytesOfOutputAndClosedOutput) {
+  addModel("--print-bytes 8000000 --message 'the last word' --close-output 1");
+  initialise();
+  EXPECT_EQ(run(), BatchStatus::succeeded);
+  EXPECT_THAT(launcher_.lastOutput(1, 1), ElementsAre("the last word"));
+  EXPECT_EQ(launcher_.lastOutput(1, 20).size(), 20u);
+  EXPECT_GT(std::filesystem::file_size(folder_ / "run_Process1/mirevo_batch.log"), 8'000'000u);
+  EXPECT_EQ(std::filesystem::file_size(folder_ / "run_Process1/simulated.csv"),
+            folder_.read("run_Process1/simulated.csv").size());
+}
+
+TEST_F(PosixProcessLauncherTest, EndsAndNamesWhatABatchLeavesBehind) {
+  addModel("--grandchild stayed.pid");
+  initialise();
+  EXPECT_EQ(run(), BatchStatus::succeeded);
+  const std::string id = read("stayed.pid");
+  EXPECT_FALSE(isRunning(std::stoi(id)));
+  EXPECT_EQ(launcher_.leftBehind(1),
+            "run.sh left a process running, which was ended: test_model (" + id.substr(0, id.size() - 1) + ")");
+  folder_.write("run_Process1/run.sh", "true\n");
+  EXPECT_EQ(run(), BatchStatus::succeeded);
+  EXPECT_EQ(launcher_.leftBehind(1), "");
+}
+
+TEST_F(PosixProcessLauncherTest, ADaemonMayServeLaterRunsButDoesNotOutliveThem) {
+  folder_.write("base/run.sh",
+                "setsid sh -c 'echo $$ >id.txt; exec sleep 60' &\nwhile ! [ -s id.txt ]; do sleep 0.01; done\n");
+  addItem("run.sh");
+  initialise();
+  EXPECT_EQ(run(), BatchStatus::succeeded);
+  const int daemon = std::stoi(read("id.txt"));
+  EXPECT_TRUE(isRunning(daemon));
+  launcher_.haltProcesses();
+  EXPECT_FALSE(isRunning(daemon));
+}
+
+TEST_F(PosixProcessLauncherTest, SlotsRunAtOnceAndTheWaitEndsWithTheFirst) {
+  addModel("");
+  settings_.slotCount = 2;
+  initialise();
+  folder_.write("run_Process1/parameters.txt", "sleep-ms = 60000\n");
+  folder_.write("run_Process2/parameters.txt", "sleep-ms = 20\n");
+  const auto start = Clock::now();
+  launcher_.createProcesses(1);
+  launcher_.createProcesses(2);
+  EXPECT_EQ(finish(2), BatchStatus::succeeded);
+  EXPECT_LT(secondsSince(start), 2.5);
+  std::int32_t executing = 0;
+  std::int32_t status = 0;
+  launcher_.isExecuting(1, executing, status);
+  EXPECT_EQ(executing, 1);
+  launcher_.waitForChange(0.01);  // nothing changes; the time given ends it
+  launcher_.haltProcesses();
+  EXPECT_EQ(finish(1), BatchStatus::failed);
+  EXPECT_LT(secondsSince(start), 10);
+}
+
+TEST_F(PosixProcessLauncherTest, HaltingIsGentleFirstAndThenSure) {
+  const struct {
+    const char* script;
+    double graceSeconds;
+    double atMostSeconds;
+    bool gentle;  // the batch gets to say that it was asked to end
+  } cases[] = {
+      {"trap 'echo asked >asked.txt; exit 0' TERM\necho $$ >id.txt\nwhile :; do sleep 0.01; done\n", 20.0, 10.0, true},
+      // Its first process ends at once; the model that it started needs a moment and must get it.
+      {"(trap 'sleep 0.1; echo asked >asked.txt; exit 0' TERM\necho 1 >id.txt; while :; do sleep 0.01; done) & wait\n",
+       20.0, 10.0, true},
+      {"trap '' TERM\n" MIREVO_TEST_MODEL " --grandchild id.txt --ignore-term 1 --sleep-ms 60000\n", 0.1, 10.0, false},
+  };
+  addItem("run.sh");
+  for (const auto& c : cases) {
+    folder_.write("base/run.sh", c.script);
+    settings_.graceSeconds = c.graceSeconds;
+    initialise();
+    launcher_.createProcesses(1);
+    ASSERT_TRUE(waitUntil([&] { return hasContent("run_Process1/id.txt"); })) << c.script;
+    const auto start = Clock::now();
+    launcher_.haltProcesses();
+    EXPECT_LT(secondsSince(start), c.atMostSeconds) << c.script;
+    EXPECT_EQ(read("asked.txt") == "asked\n", c.gentle) << c.script;
+    if (!c.gentle) {
+      EXPECT_FALSE(isRunning(std::stoi(read("id.txt"))));
+    }
+  }
+}
+
+TEST_F(PosixProcessLauncherTest, NothingOutlivesTheProgram) {
+  // Each way for a program to end, with two slots running a shell, a daemon, a model and a stubborn grandchild each.
+  const struct {
+    const char* name;
+    std::function<void()> end;
+  } cases[] = {
+      {"kill -9", [] { ::kill(::getpid(), SIGKILL); }},
+      {"leaves from a signal handler",
+       [] {
+         ::signal(SIGTERM, [](int) {
+           haltProcessesFromSignal();
+           ::_exit(1);
+         });
+         ::raise(SIGTERM);
+       }},
+      {"exits without a word", [] { ::_exit(0); }},
+  };
+  folder_.write("base/run.sh",
+                "trap '' TERM\nsetsid sh -c 'echo $$ >daemon.txt; exec sleep 60' &\n"
+                "while ! [ -s daemon.txt ]; do sleep 0.01; done\n" MIREVO_TEST_MODEL
+                " --grandchild id.txt --ignore-term 1 --sleep-ms 60000\necho never >never.txt\n");
+  addItem("run.sh");
+  settings_.slotCount = 2;
+  for (const auto& c : cases) {
+    const pid_t program = ::fork();
+    if (program == 0) {
+      PosixProcessLauncher launcher;
+      if (!launcher.initialise(settings_)) ::_exit(9);
+      launcher.createProcesses(1);
+      launcher.createProcesses(2);
+      waitUntil([&] { return hasContent("run_Process1/id.txt") && hasContent("run_Process2/id.txt"); });
+      c.end();
+      ::_exit(9);
+    }
+    int status = 0;
+    ASSERT_EQ(::waitpid(program, &status, 0), program);
+    EXPECT_FALSE(WIFEXITED(status) && WEXITSTATUS(status) == 9) << c.name;
+    for (const char* slot : {"run_Process1", "run_Process2"}) {
+      for (const char* file : {"/id.txt", "/daemon.txt"}) {
+        const std::string id = folder_.read(slot + std::string(file));
+        ASSERT_FALSE(id.empty()) << c.name;
+        EXPECT_TRUE(waitUntil([&] { return !isRunning(std::stoi(id)); })) << c.name << file;
+      }
+      EXPECT_FALSE(folder_.exists(std::string(slot) + "/never.txt")) << c.name;
+    }
+  }
+}
+
+TEST_F(PosixProcessLauncherTest, RefusesToStartWithAReason) {
+  folder_.write("base/run.sh", "");
+  const std::string base = settings_.baseFolder;
+  const struct {
+    std::string prefix;
+    std::string batchFile;
+    const char* arguments;
+    std::string reason;
+  } cases[] = {
+      {folder_ / "run_Process", base + "/run.sh", "'open",
+       "Arguments of " + base + "/run.sh: expected a closing ' for the one at character 1: 'open"},
+      {folder_ / "run_Process", folder_ / "other/run.sh", "",
+       (folder_ / "other/run.sh") + " does not lie in the model's folder " + base},
+      {base + "/run.sh/run_Process", base + "/run.sh", "",
+       "Unable to look at " + base + "/run.sh/run_Process1: Not a directory"},
+  };
+  for (const auto& c : cases) {
+    settings_.processFolderPrefix = c.prefix;
+    settings_.batchItems = {{c.batchFile, c.arguments}};
+    EXPECT_FALSE(launcher_.initialise(settings_));
+    EXPECT_EQ(launcher_.lastError(), c.reason);
+  }
+}
+
+TEST_F(PosixProcessLauncherTest, NeverRemovesTheModelItself) {
+  folder_.write("run_Process1/model/run.sh", "");
+  settings_.baseFolder = folder_ / "run_Process1/model";
+  addItem("run.sh");
+  EXPECT_FALSE(launcher_.initialise(settings_));
+  EXPECT_THAT(launcher_.lastError(), HasSubstr("which is made anew for every run"));
+  EXPECT_TRUE(folder_.exists("run_Process1/model/run.sh"));
+}
+
+TEST_F(PosixProcessLauncherTest, ResistanceUpdateLooksAtTheEndingFirst) {
+  EXPECT_EQ(launcher_.r35UpdateResistanceNumbers("/m/river.qcs"), ResistanceUpdate::wrongExtension);
+  EXPECT_EQ(launcher_.r35UpdateResistanceNumbers("/m/river.QCSR"), ResistanceUpdate::libraryNotFound);
+}
+
+/// The time is that of the whole batch, so that the second item is ended in its own 30th second.
+TEST_F(PosixProcessLauncherTest, ABatchThatRunsTooLongIsEndedWithAllThatItStarted) {
+  const struct {
+    const char* options;
+    bool needsKill;
+  } cases[] = {{"--sleep-ms 60000 --grandchild grandchild.pid", false},
+               {"--sleep-ms 60000 --ignore-term 1 --grandchild grandchild.pid", true}};
+  for (const auto& c : cases) {
+    settings_.batchItems.clear();
+    addModel("", "quick.sh");
+    addModel(c.options, "slow.sh");
+    settings_.maxSeconds = 100.0;
+    now_ = 1e6;
+    initialise();
+    std::int32_t executing = 1;
+    std::int32_t status = 0;
+    const auto look = [&] {
+      launcher_.isExecuting(1, executing, status);
+      return executing != 0;
+    };
+    launcher_.createProcesses(1);
+    now_ += 70.0;
+    ASSERT_TRUE(waitUntil([&] { return look() && hasContent("run_Process1/grandchild.pid"); }));
+    now_ += 30.0;
+    EXPECT_TRUE(look()) << "exactly the time that it may take";
+    now_ += 0.5;
+    look();
+    if (c.needsKill) {
+      now_ += settings_.graceSeconds - 0.1;
+      launcher_.waitForChange(0.05);
+      EXPECT_TRUE(look()) << "within the grace time";
+      now_ += 0.2;
+    }
+    EXPECT_EQ(finish(1), BatchStatus::failed);
+    EXPECT_EQ(launcher_.failure(1).kind, BatchFailure::Kind::timedOut);
+    EXPECT_EQ(launcher_.failure(1).detail, "slow.sh was ended because it ran longer than 100 seconds");
+    if (c.needsKill) {
+      const pid_t grandchild = std::atoi(read("grandchild.pid").c_str());
+      EXPECT_TRUE(waitUntil([&] { return !isRunning(grandchild); }));
+    }
+  }
+  settings_.batchItems.clear();
+  addModel("");
+  initialise();
+  EXPECT_EQ(run(), BatchStatus::succeeded) << "the next run has its own time";
+}
+
+}  // namespace
+}  // namespace mirevo

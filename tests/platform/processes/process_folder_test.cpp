@@ -1,0 +1,173 @@
+#include "platform/processes/process_folder.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "refusal.h"
+#include "temporary_folder.h"
+
+namespace mirevo {
+namespace {
+
+namespace fs = std::filesystem;
+
+struct stat statusOf(const std::string& path) {
+  struct stat status {};
+  EXPECT_EQ(lstat(path.c_str(), &status), 0) << path;
+  return status;
+}
+
+TEST(ProcessFolder, CopiesFilesFoldersModesAndTimes) {
+  const TemporaryFolder folder;
+  folder.write("base/run.sh", "#!/bin/sh\n", 0755);
+  folder.write("base/in/read_only.txt", "1", 0444);
+  folder.write("base/in/deep/er/empty", "");
+  folder.write("base/large.bin", std::string(3'000'000, 'z') + "end");
+  fs::create_directory(folder / "base/none");
+  fs::permissions(folder / "base/in/deep", fs::perms::owner_read | fs::perms::owner_exec);
+  const timespec times[2] = {{1'000'000'000, 0}, {1'000'000'007, 5}};
+  utimensat(AT_FDCWD, (folder / "base/in/read_only.txt").c_str(), times, 0);
+
+  makeProcessFolder(folder / "base", folder / "run_Process1", folder / "run_Process");
+
+  EXPECT_EQ(statusOf(folder / "run_Process1/run.sh").st_mode & 07777, 0755u);
+  EXPECT_EQ(statusOf(folder / "run_Process1/in/read_only.txt").st_mode & 07777, 0444u);
+  EXPECT_EQ(statusOf(folder / "run_Process1/in/read_only.txt").st_mtim.tv_sec, 1'000'000'007);
+  EXPECT_EQ(folder.read("run_Process1/large.bin"), folder.read("base/large.bin"));
+  EXPECT_TRUE(folder.exists("run_Process1/in/deep/er/empty"));
+  EXPECT_TRUE(folder.exists("run_Process1/none"));
+}
+
+TEST(ProcessFolder, ReplacesWhatWasThere) {
+  const TemporaryFolder folder;
+  folder.write("base/run.sh", "new");
+  folder.write("run_Process1/run.sh", "old");
+  folder.write("run_Process1/left/over.txt", "old");
+  fs::permissions(folder / "run_Process1/left", fs::perms::owner_read | fs::perms::owner_exec);
+  folder.write("elsewhere/kept.txt", "kept");
+  fs::create_directory_symlink(folder / "elsewhere", folder / "run_Process1/link");
+
+  makeProcessFolder(folder / "base", folder / "run_Process1", folder / "run_Process");
+
+  EXPECT_EQ(folder.read("run_Process1/run.sh"), "new");
+  EXPECT_FALSE(folder.exists("run_Process1/left"));
+  EXPECT_EQ(folder.read("elsewhere/kept.txt"), "kept");
+}
+
+TEST(ProcessFolder, LinksLeadWhereTheyShould) {
+  const TemporaryFolder folder;
+  folder.write("setup/model/base/data/x.txt", "x");
+  folder.write("setup/model/shared/y.txt", "y");
+  const std::string base = folder / "setup/model/base";
+  fs::create_symlink("data/x.txt", base + "/inside_relative");
+  fs::create_symlink(base + "/data/x.txt", base + "/inside_absolute");
+  fs::create_symlink("../shared/y.txt", base + "/outside_relative");
+  fs::create_symlink(folder / "setup/model/shared/y.txt", base + "/outside_absolute");
+  fs::create_symlink("nowhere", base + "/dangling");
+  fs::create_symlink(".", base + "/data/loop");
+
+  const std::string copy = folder / "setup/run_Process1";
+  makeProcessFolder(base, copy, folder / "setup/run_Process");
+
+  const struct {
+    const char* name;
+    std::string target;
+  } cases[] = {
+      {"/inside_relative", "data/x.txt"},
+      {"/inside_absolute", copy + "/data/x.txt"},
+      {"/outside_relative", folder / "setup/model/shared/y.txt"},
+      {"/outside_absolute", folder / "setup/model/shared/y.txt"},
+      {"/dangling", "nowhere"},
+      {"/data/loop", "."},
+  };
+  for (const auto& c : cases) EXPECT_EQ(fs::read_symlink(copy + c.name).string(), c.target) << c.name;
+}
+
+// A setup that lies in the model's own folder has what its runs make in what it copies.
+TEST(ProcessFolder, NeverCopiesWhatRunsMake) {
+  const TemporaryFolder folder;
+  folder.write("run.sh", "");
+  folder.write("cal_Process2/big.dat", "");                             // of this run
+  folder.write("other_Process1/" + std::string(kBatchLogName), "log");  // of another setup's run
+  folder.write("my_Process1/data.txt", "mine");                         // somebody's own: no batch log
+  folder.write("cal_Processes/data.txt", "mine");
+  folder.write("in/deep/cal.KDX", "");
+  folder.write("in/deep/cal_Saved/1/out.csv", "");
+  for (const char* setup : {"cal.kdx", "cal.1.kdx"}) folder.write(setup, "");
+  const struct {
+    const char* name;
+    const char* content;
+    bool isCopied;
+  } files[] = {
+      {"cal_Saved/out.csv", "", false},
+      {"cal_Saved.12/out.csv", "", false},
+      {"cal_Saved.old/data.txt", "mine", true},
+      {"my_Saved/data.txt", "mine", true},  // no setup of that name
+      {"cal_Failed17/run.sh", "", false},
+      {"cal_Failed/run.sh", "mine", true},
+      {"cal_Optimisation.dat", "", false},
+      {"cal_Optimisation.3.dat", "", false},
+      {"cal_Optimisation.old.dat", "mine", true},
+      {"cal.1_Sensitivity.dat", "", false},
+      {"cal_Band_2.csv", "", false},
+      {"cal_Band_2.1.csv", "", false},
+      {"cal_Report.html", "", false},
+      {"cal_Series.dat", "", false},
+      {"cal_Series.dat.tmp", "", false},
+      {"calSimErr.dat.tmp", "", false},
+      {"cal.dat.tmp", "initial storages\n", true},
+      {"cal._spi_", "", false},
+      {"calSimErr.1.dat", "", false},
+      {"cal.log", "Warning: early\nMirevo 1.2, started\n", false},
+      {"cal.2.dat", "# Title\n# Mirevo 1.2\n", false},
+      {"cal.dat", "initial storages\n", true},  // the model's, as their content shows
+      {"cal.1.log", "", true},
+      {"cal.txt", "Mirevo ", true},
+      {"in/calSimErr.dat", "mine", true},  // no setup beside it
+  };
+  for (const auto& file : files) folder.write(file.name, file.content);
+  for (int round = 0; round < 2; ++round)
+    makeProcessFolder(folder.path(), folder / "cal_Process1", folder / "cal_Process");
+
+  EXPECT_TRUE(folder.exists("cal_Process1/run.sh"));
+  EXPECT_FALSE(folder.exists("cal_Process1/cal_Process1"));
+  EXPECT_FALSE(folder.exists("cal_Process1/cal_Process2"));
+  EXPECT_FALSE(folder.exists("cal_Process1/other_Process1"));
+  EXPECT_TRUE(folder.exists("cal_Process1/my_Process1/data.txt"));
+  EXPECT_TRUE(folder.exists("cal_Process1/cal_Processes/data.txt"));
+  EXPECT_FALSE(folder.exists("cal_Process1/in/deep/cal_Saved"));
+  for (const auto& file : files) {
+    EXPECT_EQ(folder.exists(std::string("cal_Process1/") + file.name), file.isCopied) << file.name;
+  }
+}
+
+TEST(ProcessFolder, KnowsItsOwnBehindALink) {
+  const TemporaryFolder folder;
+  folder.write("base/scratch/cal_Process2/run.sh", "");
+  fs::create_directory_symlink(folder / "base/scratch", folder / "link");
+  makeProcessFolder(folder / "base", folder / "link/cal_Process1", folder / "link/cal_Process");
+  EXPECT_TRUE(folder.exists("link/cal_Process1/scratch"));
+  EXPECT_TRUE(fs::is_empty(folder / "link/cal_Process1/scratch"));
+}
+
+TEST(ProcessFolder, NamesThePathThatCannotBeCopied) {
+  const TemporaryFolder folder;
+  folder.write("base/run.sh", "");
+  const struct {
+    const char* source;
+    const char* target;
+    std::string refusal;
+  } cases[] = {{"base", "no/such/run_Process", "create the folder " + folder / "no/such/run_Process1"},
+               {"missing", "run_Process", "read the folder " + folder / "missing"}};
+  for (const auto& c : cases) {
+    EXPECT_EQ(refusalOf([&] { makeProcessFolder(folder / c.source, folder / c.target + "1", folder / c.target); }),
+              "Unable to " + c.refusal + ": No such file or directory");
+  }
+}
+
+}  // namespace
+}  // namespace mirevo

@@ -1,0 +1,184 @@
+#include "platform/series/csv_time_series.h"
+
+#include <cmath>
+#include <fstream>
+#include <string>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "common/calendar.h"
+
+namespace mirevo {
+namespace {
+
+using ::testing::ElementsAre;
+
+/// The item's values, -999999 where one is missing (NaN does not compare).
+std::vector<float> valuesOf(CsvTimeSeries& series, int item) {
+  EXPECT_TRUE(series.getData(item)) << series.lastError();
+  const auto values = series.values(item);
+  std::vector<float> shown(values.begin(), values.end());
+  for (float& value : shown) {
+    if (isMissing(value, series.deleteValue())) value = -999999.0F;
+  }
+  return shown;
+}
+
+TEST(CsvTimeSeries, ReadsEveryFormOfFile) {
+  struct Case {
+    const char* name;
+    std::string content;
+  };
+  // Each is the same series: 1.5 at 2000-02-28 00:00, missing at 12:00, -200 at 24:00 (the 29th), 0.25 on the 1st.
+  const Case cases[] = {
+      {"comma", "time,Q\n2000-02-28,1.5\n2000-02-28 12:00,\n2000-02-28 24:00,-2e2\n2000-03-01 00:00:00,.25\n"},
+      {"semicolon, CRLF, no last line end",
+       "time;Q\r\n2000-02-28;1.5\r\n2000-02-28T12:00;-nan\r\n2000-02-29;-200\r\n2000-03-01;0.25"},
+      {"tab, missing mark, comments, byte-order mark",
+       "\xEF\xBB\xBF# gauge 4\n\n#missing=-9.99\n# missing values are marked\n"
+       "time\tQ\n2000-02-28\t1.5\n2000-02-28 12:00\t-9.990\n2000-02-29\t-200\n2000-03-01\t0.25\n\n \n"},
+      {"quotes, blanks, minute 60",
+       "\"time\",\"Q, m3/s\"\n\"2000-02-28\",\"1.5\"\n 2000-02-28 11:60 , NA \n"
+       "2000-02-29 , -2.0D+02\n\"2000-02-29T23:60:00\",+0.25\n"},
+      {"semicolon with commas in a name, NaN in capitals",
+       "time;Q, m3/s, gauge\n2000-02-28;1.5\n2000-02-28 12:00;nAN\n2000-02-29;-200\n2000-03-01;0.25\n"},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(c.name);
+    CsvTimeSeries series;
+    ASSERT_TRUE(series.parse("q.csv", c.content)) << series.lastError();
+    EXPECT_EQ(series.itemCount(), 1);
+    EXPECT_EQ(formatDate(series.startTime().value()), "2000-02-28 00:00");
+    EXPECT_THAT(std::vector<double>(series.times().begin(), series.times().end()), ElementsAre(0.0, 0.5, 1.0, 2.0));
+    EXPECT_THAT(valuesOf(series, 1), ElementsAre(1.5F, -999999.0F, -200.0F, 0.25F));
+  }
+}
+
+TEST(CsvTimeSeries, RefusesWithThePlaceAndWhatWasExpected) {
+  struct Case {
+    std::string content;
+    std::string error;  ///< behind "s.csv:"
+  };
+  const std::string head = "# c\ntime,Q,H\n2001-01-31 00:00,1,2\n";
+  const std::string noHeader =
+      ":1: expected a header row (the time column's name, then one name an item), found the end of the file";
+  const std::string noTime = "4:1: expected a valid time like 2001-01-31 12:30, found ";
+  const Case cases[] = {
+      {"", "1" + noHeader},
+      {"# only\n", "2" + noHeader},
+      {"time Q\n",
+       "1:1: expected a header row with its columns separated by comma, semicolon or tab, found \"time Q\""},
+      {"2001-01-31,1\n", "1:1: expected a header row before the first time step, found \"2001-01-31,1\""},
+      {"# missing = \ntime,Q\n", "1:12: expected a number after \"# missing =\", found \"\""},
+      {"# missing = none\ntime,Q\n", "1:13: expected a number after \"# missing =\", found \"none\""},
+      {head + "2001-01-31,1,2\n", "4:1: expected a time later than 2001-01-31 00:00, found 2001-01-31 00:00"},
+      {head + "2001-01-30 23:59:59,1,2\n",
+       "4:1: expected a time later than 2001-01-31 00:00, found 2001-01-30 23:59:59"},
+      {head + "2001-02-29,1,2\n", noTime + "\"2001-02-29\""},
+      {head + "31.01.2001,1,2\n", noTime + "\"31.01.2001\""},
+      {head + "2001-02-01 24:01,1,2\n", noTime + "\"2001-02-01 24:01\""},
+      {head + "2001-02-01 12:30:60,1,2\n", noTime + "\"2001-02-01 12:30:60\""},
+      {head + ",1,2\n", noTime + "\"\""},
+      {head + std::string(10, '\0') + ",1,2\n", noTime + "\"??????????\""},
+      {head + "2001-02-01,1\n", "4:1: expected 3 columns as in the header row, found 2"},
+      {head + "2001-02-01\n", "4:1: expected 3 columns as in the header row, found 1"},
+      {head + "2001-02-01,1,2,\r\n", "4:1: expected 3 columns as in the header row, found 4"},
+      {head + "2001-02-01,\"1,2\n", "4:1: expected 3 columns as in the header row, found 2"},
+  };
+  for (const Case& c : cases) {
+    CsvTimeSeries series;
+    EXPECT_FALSE(series.parse("s.csv", c.content)) << c.content;
+    EXPECT_EQ(series.lastError(), "s.csv:" + c.error);
+    EXPECT_EQ(series.timeStepCount(), 0);
+  }
+}
+
+TEST(CsvTimeSeries, ReadsAColumnOnlyWhenItIsAskedFor) {
+  CsvTimeSeries series;
+  ASSERT_TRUE(series.parse("s.csv",
+                           "time,Q,\"flag, quality\",H,big\n2001-01-01,1,A:e,3,3.4028235e38\n"
+                           "2001-01-02,2,\"x,y\",4,-3.5e38\n"));
+  ASSERT_EQ(series.itemCount(), 4);
+  EXPECT_EQ(series.itemName(2), "flag, quality");
+  EXPECT_FALSE(series.getData(2));
+  EXPECT_EQ(series.lastError(),
+            "s.csv:2:14: expected a number of at most 3.4028235e38 in size, an empty cell, NaN or NA, found \"A:e\"");
+  EXPECT_TRUE(series.values(2).empty());
+  EXPECT_FALSE(series.getData(4));
+  EXPECT_EQ(series.lastError(),
+            "s.csv:3:22: expected a number of at most 3.4028235e38 in size, an empty cell, NaN or NA, found "
+            "\"-3.5e38\"");
+  // Backwards over the quoted cell, forwards again, and a second time.
+  EXPECT_THAT(valuesOf(series, 1), ElementsAre(1.0F, 2.0F));
+  EXPECT_THAT(valuesOf(series, 3), ElementsAre(3.0F, 4.0F));
+  EXPECT_THAT(valuesOf(series, 1), ElementsAre(1.0F, 2.0F));
+  EXPECT_FALSE(series.getData(5));
+  EXPECT_FALSE(series.getData(0));
+}
+
+TEST(CsvTimeSeries, CellsThatAreNoNumbersAreRefused) {
+  for (const char* cell : {"inf", "-Infinity", "1,5", "1.5x", "0x1p3", "--1", "****", "nan(1)", "1 2", "1e400", "na"}) {
+    CsvTimeSeries series;
+    ASSERT_TRUE(series.parse("s.csv", "time;Q\n2001-01-01;" + std::string(cell) + "\n")) << series.lastError();
+    EXPECT_FALSE(series.getData(1)) << cell;
+  }
+  // Too small for a float is no error: a tiny discharge is a zero.
+  for (const char* cell : {"1e-60", "-1e-400"}) {
+    CsvTimeSeries series;
+    ASSERT_TRUE(series.parse("s.csv", "time,Q\n2001-01-01," + std::string(cell) + "\n"));
+    EXPECT_THAT(valuesOf(series, 1), ElementsAre(0.0F)) << cell;
+  }
+}
+
+TEST(CsvTimeSeries, AHeaderAloneIsAFileWithoutSteps) {
+  CsvTimeSeries series;
+  ASSERT_TRUE(series.parse("s.csv", "time,Q"));
+  EXPECT_EQ(series.timeStepCount(), 0);
+  EXPECT_FALSE(series.startTime().has_value());
+  EXPECT_TRUE(series.getData(1));
+}
+
+TEST(CsvTimeSeries, AFileCutOffAnywhereIsReadOrRefusedButNeverCrashes) {
+  const std::string whole = "time,Q,H\n2001-01-01 00:00,1.25,3\n2001-01-01 01:00,\"2.5\",4\n2001-01-01 02:00,3,NaN\n";
+  int refused = 0;
+  int complete = 0;
+  for (std::size_t length = 0; length <= whole.size(); ++length) {
+    CsvTimeSeries series;
+    if (!series.parse("s.csv", whole.substr(0, length))) {
+      ++refused;
+      EXPECT_THAT(series.lastError(), ::testing::StartsWith("s.csv:")) << length;
+      continue;
+    }
+    // Shape holds; a row whose cells are all begun may pass, a row that lacks one never does.
+    for (int item = 1; item <= series.itemCount(); ++item) {
+      if (series.getData(item)) {
+        EXPECT_EQ(series.values(item).size(), static_cast<std::size_t>(series.timeStepCount())) << length;
+      }
+    }
+    if (series.timeStepCount() == 3) ++complete;
+  }
+  EXPECT_GT(refused, 40);
+  EXPECT_EQ(complete, 5);  // "...02:00,3," and one more a character of "NaN\n"
+}
+
+TEST(CsvTimeSeries, OpenSaysWhyAFileCannotBeRead) {
+  CsvTimeSeries series;
+  EXPECT_FALSE(series.open("no_such_folder/q.csv"));
+  EXPECT_EQ(series.lastError(), "no_such_folder/q.csv: No such file or directory");
+  EXPECT_FALSE(series.open(::testing::TempDir()));
+  EXPECT_THAT(series.lastError(), ::testing::EndsWith("Is a directory"));
+  EXPECT_FALSE(series.open("/dev/zero"));
+  EXPECT_EQ(series.lastError(), "/dev/zero: Not a regular file");
+  // The same object reads another file after a failure, with nothing left of the one before.
+  const std::string path = ::testing::TempDir() + "/reopened.csv";
+  std::ofstream(path) << "time,Q\n2001-01-01,7\n";
+  ASSERT_TRUE(series.open(path)) << series.lastError();
+  EXPECT_THAT(valuesOf(series, 1), ElementsAre(7.0F));
+  std::ofstream(path) << "time,Q\n2001-01-01,8\n2001-01-02,9\n";
+  ASSERT_TRUE(series.open(path)) << series.lastError();
+  EXPECT_THAT(valuesOf(series, 1), ElementsAre(8.0F, 9.0F));
+}
+
+}  // namespace
+}  // namespace mirevo

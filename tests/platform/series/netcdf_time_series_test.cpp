@@ -1,0 +1,292 @@
+#include "platform/series/netcdf_time_series.h"
+
+#include <cstdio>
+#include <filesystem>
+#include <fstream>
+#include <numeric>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <netcdf.h>
+
+#include "common/calendar.h"
+#include "platform/series/netcdf_units.h"
+
+namespace mirevo {
+namespace {
+
+using ::testing::DoubleNear;
+using ::testing::ElementsAre;
+using ::testing::HasSubstr;
+
+/// A file that a test writes by calls of the library.
+class NetcdfFile final {
+ public:
+  explicit NetcdfFile(const std::string& name, int mode = NC_NETCDF4)
+      : path_(std::string(::testing::TempDir()) + "/" + name) {
+    check(nc_create(path_.c_str(), mode | NC_CLOBBER, &id_));
+  }
+  ~NetcdfFile() { std::remove(path_.c_str()); }
+  NetcdfFile(const NetcdfFile&) = delete;
+  NetcdfFile& operator=(const NetcdfFile&) = delete;
+
+  const std::string& path() const { return path_; }
+  int id() const { return id_; }
+  int dimension(const char* name, std::size_t length) const {
+    int dimension = -1;
+    check(nc_def_dim(id_, name, length, &dimension));
+    return dimension;
+  }
+  int variable(const char* name, nc_type type, std::vector<int> dimensions) const {
+    int variable = -1;
+    check(nc_def_var(id_, name, type, static_cast<int>(dimensions.size()), dimensions.data(), &variable));
+    return variable;
+  }
+  void text(int variable, const char* name, const std::string& value) const {
+    check(nc_put_att_text(id_, variable, name, value.size(), value.c_str()));
+  }
+  void number(int variable, const char* name, nc_type type, double value) const {
+    check(nc_put_att_double(id_, variable, name, type, 1, &value));
+  }
+  void values(int variable, const std::vector<double>& values) const {
+    nc_enddef(id_);  // an error where the format needs none
+    check(nc_put_var_double(id_, variable, values.data()));
+  }
+  int time(int dimension, const std::string& units) const {
+    const int variable = this->variable("time", NC_DOUBLE, {dimension});
+    text(variable, "units", units);
+    return variable;
+  }
+  void close() const { check(nc_close(id_)); }
+  /// Daily values of a variable "flow"; writes and closes the file.
+  void writeFlow(const std::vector<double>& flow) const {
+    const int days = dimension("time", flow.size());
+    const int axis = time(days, "days since 1990-01-01");
+    const int variable = this->variable("flow", NC_DOUBLE, {days});
+    std::vector<double> numbers(flow.size());
+    std::iota(numbers.begin(), numbers.end(), 0.0);
+    values(axis, numbers);
+    values(variable, flow);
+    close();
+  }
+
+ private:
+  static void check(int status) { ASSERT_EQ(status, NC_NOERR) << nc_strerror(status); }
+
+  std::string path_;
+  int id_ = -1;
+};
+
+std::vector<float> valuesOf(NetcdfTimeSeries& series, int item) {
+  EXPECT_TRUE(series.getData(item)) << series.lastError();
+  const auto values = series.values(item);
+  std::vector<float> shown(values.begin(), values.end());
+  for (float& value : shown) {
+    if (isMissing(value, series.deleteValue())) value = -999999.0F;
+  }
+  return shown;
+}
+
+TEST(NetcdfTimeSeries, ReadsVariablesStationsAndPacking) {
+  for (const int mode : {NC_CLASSIC_MODEL, NC_64BIT_OFFSET, NC_NETCDF4}) {
+    NetcdfFile file("items.nc", mode);
+    const int time = file.dimension("time", 3);
+    const int station = file.dimension("station", 2);
+    const int one = file.dimension("level", 1);
+    const int two = file.dimension("nv", 2);
+    const int axis = file.time(time, "hours since 2001-01-01 00:00:00.0 UTC");
+    file.text(axis, "bounds", "time_bounds");
+    file.variable("time_bounds", NC_DOUBLE, {time, two});
+    file.variable("label", NC_CHAR, {time, two});
+    file.variable("elevation", NC_FLOAT, {station});
+    file.variable("grid", NC_FLOAT, {time, station, two});
+    const int flow = file.variable("flow", NC_FLOAT, {time, station});
+    file.number(flow, "_FillValue", NC_FLOAT, -1.0);
+    const int stage = file.variable("stage", NC_SHORT, {station, one, time});
+    file.number(stage, "missing_value", NC_SHORT, 7);
+    file.number(stage, "scale_factor", NC_DOUBLE, 0.5);
+    file.number(stage, "add_offset", NC_DOUBLE, 100.0);
+    const int count = file.variable("count", NC_INT, {time});
+    file.values(axis, {6, 12, 36});
+    file.values(flow, {1, 10, -1, 20, 3, 30});
+    file.values(stage, {2, 4, 7, -32767, 7, 0});
+    file.values(count, {5, 6, 7});
+    file.close();
+
+    NetcdfTimeSeries series;
+    ASSERT_TRUE(series.open(file.path())) << series.lastError();
+    EXPECT_EQ(formatDate(series.startTime().value()), "2001-01-01 06:00");
+    EXPECT_THAT(std::vector<double>(series.times().begin(), series.times().end()), ElementsAre(0.0, 0.25, 1.25));
+    ASSERT_EQ(series.itemCount(), 5);
+    EXPECT_EQ(series.itemName(2), "flow[2]");
+    EXPECT_EQ(series.itemName(5), "count");
+    EXPECT_THAT(valuesOf(series, 1), ElementsAre(1.0F, -999999.0F, 3.0F));
+    EXPECT_THAT(valuesOf(series, 2), ElementsAre(10.0F, 20.0F, 30.0F));
+    EXPECT_THAT(valuesOf(series, 3), ElementsAre(101.0F, 102.0F, -999999.0F));
+    EXPECT_THAT(valuesOf(series, 4), ElementsAre(-999999.0F, -999999.0F, 100.0F));  // unwritten, then missing
+    EXPECT_THAT(valuesOf(series, 5), ElementsAre(5.0F, 6.0F, 7.0F));
+    EXPECT_FALSE(series.getData(6));
+  }
+}
+
+TEST(NetcdfTimeSeries, TakesTheTimeVariableThatIsNamedLikeItsDimension) {
+  NetcdfFile file("two_times.nc");
+  const int time = file.dimension("time", 2);
+  const int forecast = file.variable("forecast", NC_DOUBLE, {time});
+  file.text(forecast, "units", "days since 1900-01-01");
+  const int axis = file.time(time, "days since 1990-1-1");
+  file.values(forecast, {0, 1});
+  // A third of a day and three years in days: the start is a whole second although the number is not.
+  file.values(axis, {1096.0 + 1.0 / 3.0, 1097.5});
+  file.close();
+  NetcdfTimeSeries series;
+  ASSERT_TRUE(series.open(file.path())) << series.lastError();
+  EXPECT_EQ(formatDate(series.startTime().value()), "1993-01-01 08:00");
+  EXPECT_THAT(std::vector<double>(series.times().begin(), series.times().end()),
+              ElementsAre(0.0, DoubleNear(7.0 / 6.0, 1e-11)));
+  EXPECT_EQ(series.itemCount(), 1);
+}
+
+TEST(NetcdfTimeSeries, RefusesByName) {
+  struct Case {
+    const char* units;
+    const char* calendar;
+    std::vector<double> times;
+    const char* error;
+  };
+  const Case cases[] = {
+      {"days since 1990-01-01",
+       "noleap",
+       {0, 1},
+       "variable \"time\": expected the calendar standard, gregorian or proleptic_gregorian, found \"noleap\""},
+      {"months since 1990-01-01",
+       "",
+       {0, 1},
+       "variable \"time\": expected time units like \"hours since 1990-01-01 00:00\", found \"months since "
+       "1990-01-01\""},
+      {"days since 1990-01-01", "", {0, 2, 2}, "variable \"time\", step 3: expected a time later than 2, found 2"},
+      {"days since 1990-01-01", "", {3, 2}, "variable \"time\", step 2: expected a time later than 3, found 2"},
+      {"days since 1990-01-01", "", {0, NC_FILL_DOUBLE}, "variable \"time\", step 2: expected a time, found 9.96"},
+      {"days since 1990-01-01", "", {1e300}, "variable \"time\", step 1: expected a time, found 1e+300"},
+      {"days", "", {0}, "expected a time variable over one dimension with units like"},
+  };
+  for (const Case& c : cases) {
+    NetcdfFile file("refused.nc");
+    const int axis = file.time(file.dimension("time", c.times.size()), c.units);
+    if (*c.calendar != '\0') file.text(axis, "calendar", c.calendar);
+    file.values(axis, c.times);
+    file.close();
+    NetcdfTimeSeries series;
+    EXPECT_FALSE(series.open(file.path())) << c.error;
+    EXPECT_THAT(series.lastError(), HasSubstr(file.path() + ": " + c.error));
+    EXPECT_EQ(series.timeStepCount(), 0);
+  }
+}
+
+TEST(NetcdfTimeSeries, AValueBeyondSinglePrecisionIsNamed) {
+  NetcdfFile file("huge.nc");
+  file.writeFlow({0, -1e39});
+  NetcdfTimeSeries series;
+  ASSERT_TRUE(series.open(file.path())) << series.lastError();
+  EXPECT_FALSE(series.getData(1));
+  EXPECT_THAT(series.lastError(), HasSubstr("variable \"flow\", step 2: expected a number of at most 3.4028235e38 in "
+                                            "size, found -1e+39"));
+}
+
+TEST(NetcdfTimeSeries, FilesThatAreNoneOrCutOffAreRefused) {
+  NetcdfTimeSeries series;
+  EXPECT_FALSE(series.open("no_such_folder/q.nc"));
+  EXPECT_EQ(series.lastError(), "no_such_folder/q.nc: opening: No such file or directory");
+  std::string content;
+  {
+    NetcdfFile file("cut.nc");
+    file.writeFlow({0, 1, 2, 3});
+    std::ifstream in(file.path(), std::ios::binary);
+    content.assign(std::istreambuf_iterator<char>(in), {});
+  }
+  const std::string path = std::string(::testing::TempDir()) + "/cut_copy.nc";
+  int refused = 0;
+  for (std::size_t length = 0; length < content.size(); length += 97) {
+    std::ofstream(path, std::ios::binary).write(content.data(), static_cast<std::streamsize>(length));
+    if (!series.open(path)) {
+      ++refused;
+      EXPECT_THAT(series.lastError(), ::testing::StartsWith(path + ": "));
+    } else if (series.itemCount() > 0) {
+      series.getData(1);
+    }
+  }
+  EXPECT_GT(refused, 10);
+  std::remove(path.c_str());
+}
+
+// The library reads zeros beyond the end of a classic file: a run that stopped half-way would count as a good one.
+TEST(NetcdfTimeSeries, AClassicFileThatWasNotWrittenToItsEndIsRefused) {
+  for (const int format : {0, NC_64BIT_OFFSET, NC_64BIT_DATA}) {
+    for (const std::size_t timeLength : {std::size_t{3}, std::size_t{NC_UNLIMITED}}) {
+      for (const bool hasTwo : {false, true}) {
+        NetcdfFile file("classic.nc", format);
+        const int time = file.dimension("time", timeLength);
+        const int axis = file.time(time, "days since 1990-01-01");
+        std::vector<int> variables{axis};
+        if (hasTwo) variables.push_back(file.variable("level", NC_SHORT, {time}));
+        variables.push_back(file.variable("flow", NC_DOUBLE, {time, file.dimension("station", 2)}));
+        file.number(variables.back(), "scale_factor", NC_DOUBLE, 1.0);
+        nc_enddef(file.id());
+        const std::size_t start[] = {0, 0};
+        const std::size_t count[] = {3, 2};
+        const double values[] = {1, 2, 3, 4, 5, 6};
+        for (const int variable : variables) {
+          ASSERT_EQ(nc_put_vara_double(file.id(), variable, start, count, values), NC_NOERR);
+        }
+        file.close();
+        const auto size = std::filesystem::file_size(file.path());
+        NetcdfTimeSeries series;
+        ASSERT_TRUE(series.open(file.path())) << series.lastError();
+        EXPECT_EQ(series.itemCount(), hasTwo ? 3 : 2);
+        for (const std::size_t left : {size - 1, size - 8, size - 40}) {
+          std::filesystem::resize_file(file.path(), left);
+          EXPECT_FALSE(series.open(file.path())) << format << " " << timeLength << " " << left;
+          EXPECT_EQ(series.lastError(), file.path() + ": expected " + std::to_string(size) +
+                                            " bytes as its header says, found " + std::to_string(left) +
+                                            ": it was not written to its end");
+        }
+      }
+    }
+  }
+}
+
+TEST(NetcdfUnits, OriginsAndCalendars) {
+  struct Case {
+    const char* units;
+    const char* calendar;
+    double secondsPerUnit;
+    DateRecord origin;
+  };
+  const Case cases[] = {
+      {"days since 1990-01-01", "", 86400, {1990, 1, 1}},
+      {"Hours Since 1990-1-2 3:04:05", "standard", 3600, {1990, 1, 2, 3, 4, 5}},
+      {"minutes since 1970-01-01T00:00:00Z", "proleptic_gregorian", 60, {1970, 1, 1}},
+      {"second since 1970-01-01 06:30:00.000 +00:00", "Gregorian", 1, {1970, 1, 1, 6, 30}},
+      {"days since 0001-01-01", "proleptic_gregorian", 86400, {1, 1, 1}},
+      {"days since 1-1-1", "standard", 86400, {0, 12, 30}},  // the Julian day, two days earlier
+      {"days since 1582-10-04", "", 86400, {1582, 10, 14}},
+      {"days since 1582-10-15", "", 86400, {1582, 10, 15}},
+  };
+  std::string reason;
+  for (const Case& c : cases) {
+    const auto units = parseTimeUnits(c.units, c.calendar, reason);
+    ASSERT_TRUE(units.has_value()) << c.units << ": " << reason;
+    EXPECT_EQ(units->secondsPerUnit, c.secondsPerUnit) << c.units;
+    EXPECT_EQ(formatDate(dateOfSecond(units->originSecond)), formatDate(c.origin)) << c.units;
+  }
+  for (const char* bad : {"", "days", "days since", "days since x", "days since 1990", "days since 1990-13-01",
+                          "days since 1990-02-29", "days since 1990-01-01 00:00 +01:00", "days since 1990-01-01 25:00",
+                          "years since 1990-01-01", "days before 1990-01-01", "days since 1990-01-01 00:00:00.5",
+                          "days since -1-01-01", "days since 1990-01-01T"}) {
+    EXPECT_FALSE(parseTimeUnits(bad, "", reason).has_value()) << bad;
+    EXPECT_THAT(reason, HasSubstr("expected time units like"));
+  }
+}
+
+}  // namespace
+}  // namespace mirevo

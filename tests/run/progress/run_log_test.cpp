@@ -1,0 +1,58 @@
+#include "run/progress/run_log.h"
+
+#include <unistd.h>
+
+#include <gtest/gtest.h>
+
+#include "temporary_folder.h"
+
+namespace mirevo {
+namespace {
+
+class RunLogTest : public testing::Test {
+ protected:
+  std::string content() const { return folder_.read("run.log"); }
+
+  TemporaryFolder folder_;
+  std::string path_ = folder_ / "run.log";
+};
+
+TEST_F(RunLogTest, LinesBeforeOpeningComeFirstAndAnOlderFileIsReplaced) {
+  std::string reason;
+  folder_.write("run.log", "an older run\n");
+  RunLog log;
+  log.line("before");
+  log.warning("early");
+  ASSERT_TRUE(log.open(path_, reason)) << reason;
+  EXPECT_EQ(content(), "before\nWarning: early\n");
+  log.line("two\nlines");
+  EXPECT_EQ(content(), "before\nWarning: early\ntwo\nlines\n") << "a record is on disk when the call returns";
+}
+
+TEST_F(RunLogTest, RecordsOfAnotherWriterAreNotOverwritten) {
+  std::string reason;
+  RunLog log;
+  ASSERT_TRUE(log.open(path_, reason)) << reason;
+  log.line("first");
+  const int copy = ::dup(log.descriptor());
+  ASSERT_EQ(::write(copy, "handler\n", 8), 8);
+  log.line("last");
+  EXPECT_EQ(content(), "first\nhandler\nlast\n");
+  log.close();
+  EXPECT_EQ(log.descriptor(), -1);
+  ::close(copy);
+}
+
+TEST_F(RunLogTest, FailuresOfTheSystemAreReported) {
+  std::string reason;
+  RunLog log;
+  EXPECT_FALSE(log.open(path_ + "/no/such/folder.log", reason));
+  EXPECT_EQ(reason, "No such file or directory");
+  ASSERT_TRUE(log.open("/dev/full", reason)) << reason;
+  EXPECT_EQ(log.writeError(), "");
+  log.line("does not fit");
+  EXPECT_EQ(log.writeError(), "No space left on device");
+}
+
+}  // namespace
+}  // namespace mirevo

@@ -1,0 +1,247 @@
+#include "run/results/restart.h"
+
+#include <cmath>
+
+#include <gmock/gmock.h>
+
+#include "run/results/failed_run_file.h"
+#include "run/results/restart_settings.h"
+#include "run/results/simulated_values_file.h"
+#include "run/setup_fixture.h"
+#include "temporary_folder.h"
+
+namespace mirevo {
+namespace {
+
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::IsEmpty;
+
+class RestartSettingsTest : public SetupFixture {
+ protected:
+  /// Through the file, as a restarted run meets them.
+  static std::vector<std::string> changes(const RunConfig& then, const RunConfig& now) {
+    const auto read = parseRestartSettings(formatRestartSettings(restartSettings(then)));
+    EXPECT_TRUE(read.has_value());
+    return changedSettings(*read, restartSettings(now));
+  }
+};
+
+TEST_F(RestartSettingsTest, WhatHasChangedIsNamed) {
+  const RunConfig then = read();
+  const struct {
+    const char* edits;
+    std::vector<std::string> changes;
+  } cases[] = {
+      {"", {}},
+      {"Upper catchment    => x & NoSimultaneousSim = 4 => NoSimultaneousSim = 2\nMaxSimulationTime = 5", {}},
+      {"'model\\run.sh' => './model/run.sh' & Upper_Bound = 900 => 9.0E2", {}},
+      {"Item_No = 2 => 2 // as before & KeyLine = 'soil' => 'other'", {}},
+      {"Max_No_Evaluations = 500 => 600", {}},
+      {"Max_No_Evaluations = 500 => 400",
+       {"Max_No_Evaluations of OPTIMISATION_ALGORITHM/STOPPING_CRITERIA: 500 then, 400 now"}},
+      {"Upper_Bound = 900 => 800", {"Upper_Bound of PARAMETER_1 (Depth): 900 then, 800 now"}},
+      {"'gauge.csv' => 'other.csv'",
+       {"File_Name of MEASURE_1/OBSERVATION_FILE (Flow error): gauge.csv then, other.csv now"}},
+      {"Weight = 0.75 => Weight = 0.75\nStandard_Deviation = 2",
+       {"Standard_Deviation of OBJECTIVE_1 (Flow): absent then, 2 now"}},
+      {"TqSEKdxListItemCount = 1\n      [CONSTRAINT_1] => 0\n      [CONSTRAINT_1]",
+       {"Left_Equation of MODEL_PARAMETERS/INTERNAL_CONSTRAINTS/CONSTRAINT_1: 'Rate' then, absent now",
+        "Right_Equation of MODEL_PARAMETERS/INTERNAL_CONSTRAINTS/CONSTRAINT_1: 'Depth' then, absent now",
+        "Logical_Operator of MODEL_PARAMETERS/INTERNAL_CONSTRAINTS/CONSTRAINT_1: 1 then, absent now"}},
+  };
+  for (const auto& row : cases) EXPECT_EQ(changes(then, read(row.edits)), row.changes);
+}
+
+TEST_F(RestartSettingsTest, FilesAreHeldAgainstTheirContent) {
+  const RunConfig config = read();
+  const auto then = parseRestartSettings(formatRestartSettings(restartSettings(config)));
+  folder_.write("model/soil.par", "written by every run");
+  folder_.write("model/soil.tpl", "!\n!Rate!\n!\n");
+  folder_.write("gauge.csv", "time,flow\n");
+  EXPECT_THAT(
+      changedSettings(*then, restartSettings(config)),
+      ElementsAre("TemplateFileName of MIREVO_SIMULATION_OPTION/SIMPARAM/SIMPARAMITEM_1: the content of model/soil.tpl "
+                  "has changed, 10 bytes then, 11 now",
+                  "File_Name of MEASURE_1/OBSERVATION_FILE (Flow error): the content of gauge.csv has changed, 0 bytes "
+                  "then, 10 now"));
+}
+
+TEST_F(RestartSettingsTest, ACutOrDamagedFileIsNotTakenForSettings) {
+  RestartSettings settings = restartSettings(read());
+  settings.searches = {{500, 500}, {700, 650}};
+  const std::string text = formatRestartSettings(settings);
+  EXPECT_EQ(parseRestartSettings(text)->searches.back().lastEvaluation, 650);
+  for (std::size_t length = 0; length + 1 < text.size(); length += 13) {
+    EXPECT_FALSE(parseRestartSettings(text.substr(0, length))) << length;
+  }
+  for (const char* line : {"Setting\ta\tb", "File\ta\tb\t1\tx\tname", "Search\t5\t6", "Search\t5\t0", "Serch\t5\t4"}) {
+    EXPECT_FALSE(parseRestartSettings(std::string(line) + "\nEnd\n")) << line;
+  }
+}
+
+/// A run whose result file holds the rows that a test gives it.
+class EarlierRunTest : public SetupFixture {
+ protected:
+  static constexpr const char* kHeader = "Evaluation\tStatus\tDepth\tRate\tFlow error\tWritten\tFlow\tAggregate\n";
+
+  std::string row(int number, const char* status = "OK") const {
+    return std::to_string(number) + "\t" + status + "\t400\t0.5\t1\t2\t3\t4\n";
+  }
+  /// The numbers of the rows that a run with `now` goes on from; or the refusal.
+  std::string taken(const RunConfig& then, const RunConfig& now, const std::string& rows) {
+    const RestartFiles files = restartFiles(folder_ / "setup_Optimisation.dat");
+    folder_.write("setup_Optimisation.dat", "# Started: then\n" + std::string(kHeader) + rows);
+    writeRestartSettings(files.settings, then);
+    try {
+      const auto run = findEarlierRun(files, now, {{"Depth", "Rate"}, {"Flow error", "Written"}, {"Flow"}});
+      if (!run) return "nothing";
+      EXPECT_EQ(run->history, std::vector<std::string>{"Started: then"});
+      searches_ = run->searches;
+      std::string numbers;
+      for (const ResultTable::Row& entry : run->rows) numbers += std::to_string(entry.number) + " ";
+      return numbers;
+    } catch (const FatalError& error) {
+      return error.detail();
+    }
+  }
+
+  std::vector<EarlierSearch> searches_;
+};
+
+TEST_F(EarlierRunTest, RowsThatTheRunGoesOnFrom) {
+  RunConfig config = read("Max_No_Evaluations = 500 => 30");
+  config.restart = 1;
+  const std::string rows = row(1) + row(3, "FAILED") + row(2) + row(5, "FAILED") + row(4, "FAILED");
+  EXPECT_EQ(taken(config, config, ""), "nothing");
+  EXPECT_EQ(taken(config, config, rows), "1 2 3 4 5 ");
+  EXPECT_EQ(taken(config, config, rows + row(5)), "1 2 3 4 5 ");
+  EXPECT_EQ(taken(config, config, rows + "6\tOK\t400\t0"), "1 2 3 4 5 ");
+  EXPECT_EQ(taken(config, config, rows + row(30) + row(31)), "1 2 3 4 5 30 31 ");
+  config.restart = 2;
+  EXPECT_EQ(taken(config, config, rows), "1 2 ");
+
+  RunConfig raised = read();
+  raised.restart = 1;
+  EXPECT_EQ(taken(config, raised, rows + row(30) + row(31)), "1 2 3 4 5 30 ");
+  const RunConfig tooSmall = read("Max_No_Evaluations = 500 => 19");
+  EXPECT_THAT(taken(tooSmall, raised, rows), HasSubstr("only a search whose budget held its initial sample of 20"));
+}
+
+TEST_F(EarlierRunTest, ARaisedBudgetOfDdsIsAnotherSearch) {
+  const auto config = [this](int budget) {
+    RunConfig read = this->read(
+        "Algorithm_Type = 1 => 2 & Include_Initial_Parameters = 1 => 0 & NoSimultaneousSim = 4 => 1 & "
+        "Max_No_Evaluations = 500 => " +
+        std::to_string(budget));
+    read.restart = 1;
+    return read;
+  };
+  std::string rows;
+  for (int number = 1; number <= 11; ++number) rows += row(number);
+  const struct {
+    int then;
+    int count;  ///< of rows
+    std::vector<EarlierSearch> before;
+    std::vector<int> lastEvaluations;
+  } cases[] = {{10, 11, {}, {10}},              // finished, with its final run
+               {10, 7, {}, {7}},                // cut off
+               {10, 2, {}, {5}},                // in the start points, which it needs
+               {20, 11, {{10, 10}}, {10, 11}},  // a second time
+               {20, 10, {{10, 10}}, {10}}};     // the second search had not begun
+  for (const auto& c : cases) {
+    RunConfig then = config(c.then);
+    then.optimisation.earlierSearches = c.before;
+    std::string some;
+    for (int number = 1; number <= c.count; ++number) some += row(number);
+    taken(then, config(40), some);
+    std::vector<int> last;
+    for (const EarlierSearch& search : searches_) last.push_back(search.lastEvaluation);
+    EXPECT_EQ(last, c.lastEvaluations) << c.then << " " << c.count;
+  }
+}
+
+TEST_F(EarlierRunTest, WithoutItsSettingsOrItsHeaderItIsRefused) {
+  const RunConfig config = read();
+  const RestartFiles files = restartFiles(folder_ / "setup_Optimisation.dat");
+  const std::string damaged = "Evalu\tStatus\n" + row(1) + row(2);
+  const struct {
+    std::string results;
+    const char* settings;  ///< no file when empty
+    const char* detail;
+  } cases[] = {{std::string(kHeader) + row(1), "", "setup_Optimisation_Restart.dat"},
+               {std::string(kHeader) + row(1), "# nothing\n", "setup_Optimisation_Restart.dat"},
+               {damaged, "", "setup_Optimisation.dat has no header row that can be read"}};
+  for (const auto& c : cases) {
+    folder_.write("setup_Optimisation.dat", c.results);
+    if (*c.settings != 0) folder_.write("setup_Optimisation_Restart.dat", c.settings);
+    EXPECT_THAT(withoutFolder(refusalOf([&] { findEarlierRun(files, config, {}); })),
+                HasSubstr(std::string("\n") + c.detail));
+  }
+}
+
+TEST(SimulatedValuesFile, KeepsWholeRecordsOfTheEvaluationsThatCount) {
+  const TemporaryFolder folder;
+  const auto add = [](SimulatedValuesFile& file, int number) {
+    EvaluationResult result;
+    result.number = number;
+    result.simulatedValues = {0.1 * number, std::nan("")};
+    file.add(result);
+  };
+  SimulatedValuesFile file(folder / "v.bin", 2);
+  file.create();
+  for (const int number : {3, 1, 2}) add(file, number);
+  const std::string whole = folder.read("v.bin");
+  constexpr std::size_t kHead = 16;
+  constexpr std::size_t kRecord = 32;
+  ASSERT_EQ(whole.size(), kHead + 3 * kRecord);
+  for (std::size_t length = 0; length <= whole.size(); ++length) {
+    folder.write("v.bin", whole.substr(0, length));
+    SimulatedValuesFile cut(folder / "v.bin", 2);
+    const auto found = cut.takeUp({1, 3});
+    const std::size_t records = length < kHead ? 0 : (length - kHead) / kRecord;
+    ASSERT_EQ(found.size(), std::min<std::size_t>(records, 2)) << length;
+    for (const auto& [number, values] : found) EXPECT_EQ(values[0], 0.1 * number);
+    add(cut, 2);
+    EXPECT_EQ(folder.read("v.bin").size(), kHead + (found.size() + 1) * kRecord);
+  }
+  std::string damaged = whole;
+  damaged[kHead + kRecord + 10] ^= 1;
+  folder.write("v.bin", damaged);
+  EXPECT_THAT(SimulatedValuesFile(folder / "v.bin", 2).takeUp({1, 2, 3}),
+              ElementsAre(testing::Key(2), testing::Key(3)));
+  EXPECT_THAT(SimulatedValuesFile(folder / "v.bin", 3).takeUp({1, 2, 3}), IsEmpty()) << "of other series";
+}
+
+TEST(FailedRunFile, IsTakenUpWithTheFailuresThatCount) {
+  const TemporaryFolder folder;
+  const auto fail = [](int number, std::string reason) {
+    EvaluationResult result;
+    result.number = number;
+    result.failure = EvaluationFailure{EvaluationFailure::Kind::timedOut, std::move(reason), {"Evaluation No. 7"}};
+    return result;
+  };
+  const std::vector<double> values{0.5};
+  {
+    FailedRunFile file(folder / "calSimErr.dat", "basin", {"k"});
+    for (const int number : {2, 9, 5}) file.add(values, fail(number, "why\nof " + std::to_string(number)));
+  }
+  const std::string whole = folder.read("calSimErr.dat");
+  folder.write("calSimErr.dat", whole + "\nEvaluation No. 11 (batch ran");
+  FailedRunFile file(folder / "calSimErr.dat", "basin", {"k"});
+  const auto failures = file.takeUp({2, 5, 11});
+  ASSERT_THAT(failures, ElementsAre(testing::Key(2), testing::Key(5)));
+  EXPECT_EQ(failures.at(5).kind, EvaluationFailure::Kind::timedOut);
+  EXPECT_EQ(failures.at(5).reason, "why of 5");
+  file.add(values, fail(9, "why\nof 9"));
+  const auto nine = whole.find("\nEvaluation No. 9");
+  const auto five = whole.find("\nEvaluation No. 5 ");
+  EXPECT_EQ(folder.read("calSimErr.dat"), whole.substr(0, nine) + whole.substr(five) + whole.substr(nine, five - nine));
+
+  FailedRunFile others(folder / "calSimErr.dat", "another", {"k"});
+  EXPECT_THAT(others.takeUp({2}), IsEmpty());
+  EXPECT_TRUE(folder.exists("calSimErr.1.dat")) << "another setup's evidence is kept";
+}
+
+}  // namespace
+}  // namespace mirevo

@@ -1,0 +1,149 @@
+#include "run/results/result_file.h"
+
+#include <signal.h>
+#include <sys/resource.h>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "common/text.h"
+#include "refusal.h"
+#include "run/results/failed_run_file.h"
+#include "temporary_folder.h"
+
+namespace mirevo {
+namespace {
+
+EvaluationResult success(int number, double measure, double objective) {
+  EvaluationResult result;
+  result.number = number;
+  result.measureValues = {measure};
+  result.objectiveValues = {objective};
+  result.aggregate = objective;
+  return result;
+}
+
+EvaluationResult failure(int number) {
+  EvaluationResult result = success(number, kFailedRunValue, kFailedRunValue);
+  result.failure = EvaluationFailure{EvaluationFailure::Kind::exitCode, "run.sh exited with code 3", {"a", "b"}};
+  return result;
+}
+
+const ResultColumns kColumns{{"Manning n"}, {"Q\tRMSE"}, {"#1 \"fit\""}};
+const std::vector<std::string> kHead{"Upper basin\nsecond line", "Mirevo 1"};
+constexpr std::string_view kHeadText =
+    "# Upper basin\n# second line\n# Mirevo 1\nEvaluation\tStatus\tManning n\tQ RMSE\t_1 'fit'\tAggregate\n";
+
+class ResultFileTest : public ::testing::Test {
+ protected:
+  void open() { results_.open(path_, kHead, kColumns); }
+  void add(const EvaluationResult& result, double parameter) { results_.addRow(std::span(&parameter, 1), result); }
+
+  TemporaryFolder folder_;
+  std::string path_ = (folder_ / "r.dat");
+  ResultFile results_;
+};
+
+TEST_F(ResultFileTest, EveryRowIsOnDiskAtOnceAndReadsBackExactly) {
+  open();
+  EXPECT_EQ(folder_.read("r.dat"), kHeadText);
+  add(success(1, 0.1 + 0.2, 5e-324), 1.0 / 3.0);
+  add(failure(2), -0.0);
+  EXPECT_EQ(folder_.read("r.dat"), std::string(kHeadText) +
+                                       "1\tOK\t0.3333333333333333\t0.30000000000000004\t5e-324\t5e-324\n"
+                                       "2\tFAILED\t-0\t1e+30\t1e+30\t1e+30\n");
+}
+
+TEST_F(ResultFileTest, RowsEndUpInTheOrderOfTheirNumbers) {
+  for (const std::vector<int>& arrival : {std::vector{1, 2, 3}, {3, 1, 2}, {2, 3, 1}, std::vector<int>{}}) {
+    open();
+    for (const int number : arrival) add(success(number, number, number), number);
+    std::string reason;
+    const std::vector<std::string> closing{"done", "Best evaluation: 1"};
+    ASSERT_TRUE(results_.finish(closing, reason)) << reason;
+    std::string expected(kHeadText);
+    if (!arrival.empty()) expected += "1\tOK\t1\t1\t1\t1\n2\tOK\t2\t2\t2\t2\n3\tOK\t3\t3\t3\t3\n";
+    EXPECT_EQ(folder_.read("r.dat"), expected + "# done\n# Best evaluation: 1\n");
+    EXPECT_FALSE(folder_.exists("r.dat.tmp"));
+  }
+}
+
+TEST_F(ResultFileTest, RowsStayWhereTheyAreWhenTheyCannotBePutInOrder) {
+  std::filesystem::create_directories((folder_ / "r.dat.tmp/in the way"));
+  open();
+  add(success(2, 2, 2), 2);
+  add(success(1, 1, 1), 1);
+  std::string reason;
+  EXPECT_FALSE(results_.finish(std::vector<std::string>{"done"}, reason));
+  EXPECT_EQ(reason, "Is a directory");
+  EXPECT_TRUE(folder_.read("r.dat").ends_with("2\tOK\t2\t2\t2\t2\n1\tOK\t1\t1\t1\t1\n# done\n"));
+}
+
+TEST_F(ResultFileTest, AFullDiskIsReportedOnceWithItsReason) {
+  std::filesystem::create_symlink("/dev/full", path_);
+  EXPECT_EQ(refusalOf([this] { open(); }), "Error: Unable to write to " + path_ + "\nNo space left on device");
+  add(success(1, 1, 1), 1);
+  std::string reason;
+  EXPECT_FALSE(results_.finish({}, reason));
+}
+
+/// Runs out of room in the middle of a row; in a process of its own, as the limit cannot be taken back.
+void writeUntilNoRoomIsLeft(const std::string& path) {
+  ::signal(SIGXFSZ, SIG_IGN);
+  const rlimit limit{200, 200};
+  ::setrlimit(RLIMIT_FSIZE, &limit);
+  ResultFile results;
+  results.open(path, kHead, kColumns);
+  const double parameter = 1.0 / 3.0;
+  try {
+    for (int number = 1;; ++number) results.addRow(std::span(&parameter, 1), success(number, 1, 1));
+  } catch (const FatalError&) {
+    ::_exit(7);
+  }
+}
+
+TEST_F(ResultFileTest, ARowThatDoesNotFitLeavesNoTornHalf) {
+  EXPECT_EXIT(writeUntilNoRoomIsLeft(path_), ::testing::ExitedWithCode(7), "");
+  const std::string content = folder_.read("r.dat");
+  EXPECT_LT(content.size(), 200U);
+  EXPECT_THAT(content, ::testing::EndsWith("\t1\t1\t1\n"));
+}
+
+TEST(KeepEarlierFile, NumbersWithoutOverwriting) {
+  const TemporaryFolder folder;
+  const struct {
+    const char* name;
+    const char* madeFile;
+    const char* kept;
+  } cases[] = {{"a.b/r.dat", "a.b/r.dat", "a.b/r.1.dat"},
+               {"a.b/r.dat", "a.b/r.dat", "a.b/r.2.dat"},
+               {"a.b/r.dat", nullptr, ""},
+               {"a.b/no_ending", "a.b/no_ending", "a.b/no_ending.1"},
+               {"v1.1.2_Saved", "v1.1.2_Saved/1/out.csv", "v1.1.2_Saved.1"}};
+  for (const auto& c : cases) {
+    if (c.madeFile != nullptr) folder.write(c.madeFile, c.kept);
+    EXPECT_EQ(keepEarlierFile(folder / c.name), *c.kept == '\0' ? "" : folder / c.kept);
+  }
+  EXPECT_EQ(folder.read("a.b/r.1.dat"), "a.b/r.1.dat");
+  EXPECT_EQ(folder.read("v1.1.2_Saved.1/1/out.csv"), "v1.1.2_Saved.1");
+  EXPECT_EQ(keepEarlierFile("/dev/full"), "");
+}
+
+TEST(FailedRunFile, AppearsWithTheFirstFailureAndSaysWhatHappened) {
+  const TemporaryFolder folder;
+  FailedRunFile file((folder / "calSimErr.dat"), "basin", {"k", "n"});
+  EXPECT_FALSE(folder.exists("calSimErr.dat"));
+  const std::vector<double> values{0.1, 2.0};
+  file.add(values, failure(4));
+  EvaluationResult silent = failure(9);
+  silent.failure->lastOutput.clear();
+  file.add(values, silent);
+  EXPECT_EQ(folder.read("calSimErr.dat"),
+            "# Failed evaluations of basin\n"
+            "\nEvaluation No. 4 (batch ended with an exit code)\n   run.sh exited with code 3\n   k = 0.1\n   n = 2\n"
+            "   Last output:\n   | a\n   | b\n"
+            "\nEvaluation No. 9 (batch ended with an exit code)\n   run.sh exited with code 3\n   k = 0.1\n   n = 2\n");
+}
+
+}  // namespace
+}  // namespace mirevo

@@ -1,0 +1,63 @@
+#include "run/results/result_table.h"
+
+#include <bit>
+#include <cmath>
+#include <limits>
+
+#include <gtest/gtest.h>
+
+#include "common/text.h"
+
+namespace mirevo {
+namespace {
+
+const std::string kHead = "# A title\n# Mirevo\nEvaluation\tStatus\tX1\tRMSE\tAggregate\n";
+
+TEST(ResultTable, EveryNumberComesBackAsItWas) {
+  std::string text = kHead;
+  const std::vector<double> values{0.1,          -0.0,     1e30, 5e-324, std::numeric_limits<double>::max(),
+                                   std::nan(""), -INFINITY};
+  for (std::size_t i = 0; i < values.size(); ++i) {
+    text += std::to_string(i + 1) + "\tOK\t" + formatReal(values[i]) + "\t1\t2\n";
+  }
+  text += "# Cancelled\n# Best evaluation: 1\n";
+  const ResultTable table = readResultTable(text);
+  ASSERT_EQ(table.rows.size(), values.size());
+  for (std::size_t i = 0; i < values.size(); ++i) {
+    EXPECT_EQ(table.rows[i].number, static_cast<int>(i) + 1);
+    EXPECT_EQ(std::isnan(values[i]), std::isnan(table.rows[i].values[0]));
+    if (!std::isnan(values[i])) {
+      EXPECT_EQ(std::bit_cast<std::uint64_t>(table.rows[i].values[0]), std::bit_cast<std::uint64_t>(values[i]));
+    }
+  }
+  EXPECT_EQ(table.headLines, (std::vector<std::string>{"A title", "Mirevo"}));
+  EXPECT_EQ(table.columns, (std::vector<std::string>{"X1", "RMSE", "Aggregate"}));
+  EXPECT_EQ(table.closingLines, (std::vector<std::string>{"Cancelled", "Best evaluation: 1"}));
+}
+
+TEST(ResultTable, AFileCutAtAnyByteHoldsItsWholeRowsAndNoOther) {
+  const std::string rows = "1\tOK\t1.25\t3\t3\n2\tFAILED\t2.5\t1e+30\t1e+30\n";
+  const std::string text = kHead + rows;
+  for (std::size_t length = 0; length <= text.size(); ++length) {
+    const ResultTable table = readResultTable(std::string_view(text).substr(0, length));
+    const std::size_t firstEnd = kHead.size() + rows.find('\n') + 1;
+    ASSERT_EQ(table.rows.size(), length == text.size() ? 2u : (length >= firstEnd ? 1u : 0u)) << length;
+    if (!table.rows.empty()) {
+      EXPECT_EQ(table.rows[0].values, (std::vector<double>{1.25, 3, 3}));
+    }
+  }
+}
+
+TEST(ResultTable, DamagedRowsAreCountedAndPassedOver) {
+  for (const std::string row : {"x\tOK\t1\t2\t3", "0\tOK\t1\t2\t3", "1\tDONE\t1\t2\t3", "1\tOK\t1\t2",
+                                "1\tOK\t1\t2\t3\t4", "1\tOK\t1\t\t3", "1\tOK\t1\t2\t3x", "99999999999\tOK\t1\t2\t3"}) {
+    const ResultTable table = readResultTable(kHead + row + "\n2\tOK\t1\t2\t3\n");
+    EXPECT_EQ(table.unusableLines, 1u) << row;
+    ASSERT_EQ(table.rows.size(), 1u) << row;
+    EXPECT_EQ(table.rows[0].number, 2) << row;
+  }
+  EXPECT_FALSE(readResultTable("some other\ttext\n").hasHeader());
+}
+
+}  // namespace
+}  // namespace mirevo

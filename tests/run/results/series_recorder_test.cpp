@@ -1,0 +1,141 @@
+#include "run/results/series_recorder.h"
+
+#include <cmath>
+
+#include <fmt/format.h>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "temporary_folder.h"
+
+namespace mirevo {
+namespace {
+
+using ::testing::ElementsAre;
+
+/// Records to `s_Series.dat` with a clock that the test sets; the period is the seconds 10 to 30.
+class SeriesRecorderTest : public ::testing::Test {
+ protected:
+  SeriesRecorder recorder() {
+    RecordedSeries run;
+    run.headLines = {"Title"};
+    run.measures = {"flow"};
+    run.observations = {{{10, 30}, {1.0F, 3.0F}}};
+    run.periodFirst = 10;
+    run.periodLast = 30;
+    return {folder_ / "s_Series.dat", std::move(run), [this] { return now_; },
+            [this](std::string_view text) { warnings_.emplace_back(text); }};
+  }
+
+  /// An evaluation whose simulated series is its number at the seconds 0 to 40.
+  void evaluate(SeriesRecorder& to, int number, double aggregate, bool isInitial = false, double value = -1.0,
+                bool hasSeries = true) {
+    EvaluationResult result;
+    result.number = number;
+    result.aggregate = aggregate;
+    const auto simulated = static_cast<float>(number);
+    if (hasSeries) result.shownSeries = {{{0, 20, 40}, {simulated, simulated, simulated}}};
+    const std::vector<double> values{value < 0.0 ? number : value};
+    if (aggregate < (best_ ? best_->aggregate : 1e30)) best_ = BestEvaluation{number, aggregate, values};
+    to.evaluationFinished(result, values, isInitial, best_);
+  }
+
+  SeriesTable table() const { return readSeriesTable(folder_.read("s_Series.dat")); }
+  std::string numbers() const {
+    const SeriesTable read = table();
+    return fmt::format("{}{} {}", read.initial ? read.initial->number : 0, read.isOfInitialParameters ? "" : "?",
+                       read.best ? read.best->number : 0);
+  }
+
+  TemporaryFolder folder_;
+  double now_ = 100.0;
+  std::vector<std::string> warnings_;
+  std::optional<BestEvaluation> best_;
+};
+
+TEST_F(SeriesRecorderTest, InitialIsTheSetupsSetOrTheFirstThatSucceededWhateverTheOrderOfArrival) {
+  SeriesRecorder run = recorder();
+  evaluate(run, 3, 5.0);
+  EXPECT_EQ(numbers(), "3? 3");
+  evaluate(run, 2, 6.0);
+  evaluate(run, 4, 7.0);
+  run.finish(best_);
+  EXPECT_EQ(numbers(), "2? 3");
+  evaluate(run, 9, 8.0, true);
+  evaluate(run, 1, 9.0);
+  run.finish(best_);
+  EXPECT_EQ(numbers(), "9 3");
+  const SeriesTable read = table();
+  ASSERT_EQ(read.series.size(), 1U);
+  EXPECT_THAT(read.series[0].seconds, ElementsAre(10, 20, 30));  // its own and the observations' times in the period
+  EXPECT_THAT(read.series[0].observed, ElementsAre(1.0F, ::testing::NanSensitiveFloatEq(std::nanf("")), 3.0F));
+  EXPECT_THAT(read.series[0].initial, ElementsAre(9.0F, 9.0F, 9.0F));
+  EXPECT_THAT(read.series[0].best, ElementsAre(3.0F, 3.0F, 3.0F));
+}
+
+TEST_F(SeriesRecorderTest, IsWrittenSeldomAndAtTheEnd) {
+  SeriesRecorder run = recorder();
+  evaluate(run, 1, 5.0, true);
+  EXPECT_EQ(numbers(), "1 1");
+  now_ += 1.0;
+  evaluate(run, 2, 4.0);
+  EXPECT_EQ(numbers(), "1 1");
+  now_ += 10.0;
+  evaluate(run, 3, 9.0, false, -1.0, false);  // a worse one brings none, but the time has come
+  EXPECT_EQ(numbers(), "1 2");
+  evaluate(run, 4, 3.0);
+  run.finish(best_);
+  EXPECT_EQ(numbers(), "1 4");
+}
+
+TEST_F(SeriesRecorderTest, FollowsTheSearchAndAggregatesThatComeLater) {
+  SeriesRecorder run = recorder();
+  evaluate(run, 1, std::nan(""), true);
+  evaluate(run, 2, std::nan(""));
+  run.aggregateSettled(1, 0.7);
+  run.finish(BestEvaluation{2, 0.5, {2.0}});  // settled: the second is the best
+  EXPECT_EQ(numbers(), "1 2");
+  EXPECT_EQ(table().initial->aggregate, 0.7);
+  EXPECT_EQ(table().best->aggregate, 0.5);
+  best_ = BestEvaluation{7, 0.5, {2.0}};  // the search took an equal one
+  run.finish(best_);
+  EXPECT_EQ(numbers(), "1 7");
+  best_ = BestEvaluation{8, 0.4, {8.0}};  // one whose series nobody has, until the final model run repeats it
+  run.finish(best_);
+  EXPECT_EQ(numbers(), "1 7");
+  evaluate(run, 20, 0.4, false, 8.0);
+  run.finish(best_);
+  EXPECT_EQ(numbers(), "1 8");
+  EXPECT_THAT(table().series.at(0).best, ElementsAre(20.0F, 20.0F, 20.0F));
+}
+
+TEST_F(SeriesRecorderTest, GoesOnFromAnEarlierFileAndWarnsOnceWhereItCannotWrite) {
+  {
+    SeriesRecorder earlier = recorder();
+    evaluate(earlier, 1, 5.0, true);
+    evaluate(earlier, 2, 4.0);
+    earlier.finish(best_);
+  }
+  SeriesRecorder run = recorder();
+  run.resume(folder_.read("s_Series.dat"));
+  std::filesystem::remove(folder_ / "s_Series.dat");
+  best_.reset();
+  evaluate(run, 1, 5.0, true, -1.0, false);  // replayed
+  evaluate(run, 2, 4.0, false, -1.0, false);
+  EXPECT_EQ(numbers(), "1 2");
+  EXPECT_THAT(table().series.at(0).best, ElementsAre(2.0F, 2.0F, 2.0F));
+  evaluate(run, 3, 3.0);
+  run.finish(best_);
+  EXPECT_EQ(numbers(), "1 3");
+
+  std::filesystem::remove(folder_ / "s_Series.dat");
+  std::filesystem::create_directories(folder_ / "s_Series.dat/in the way");
+  evaluate(run, 4, 2.0);
+  run.finish(best_);
+  evaluate(run, 5, 1.0);
+  run.finish(best_);
+  EXPECT_EQ(warnings_.size(), 1U);
+}
+
+}  // namespace
+}  // namespace mirevo

@@ -1,0 +1,232 @@
+#include "run/setup/setup_reader.h"
+
+#include <fmt/format.h>
+#include <gmock/gmock.h>
+
+#include "run/setup_fixture.h"
+
+namespace mirevo {
+namespace {
+
+using testing::ElementsAre;
+using testing::HasSubstr;
+using SetupReaderTest = SetupFixture;
+
+TEST_F(SetupReaderTest, FillsTheConfigurationOfAnOptimisation) {
+  const RunConfig config = read();
+  EXPECT_EQ(config.setupName, "setup");
+  EXPECT_EQ(config.setupFolder, folder_.path());
+  EXPECT_EQ(config.title, "Upper catchment") << "trailing blanks";
+  EXPECT_EQ(config.batchItems.at(0).batchFileName, folder_ / "model/run.sh") << "backslash";
+  EXPECT_EQ(config.baseFolder, folder_ / "model");
+  ASSERT_EQ(config.parameters.size(), 3U);
+  EXPECT_THAT(config.parameters[0].keyLines, ElementsAre("soil", "depth"));
+  EXPECT_EQ(config.parameters[0].transformationType, TransformationType::logarithmic);
+  EXPECT_EQ(config.parameters[0].lowerBound, 100.0) << "an integer where a real is wanted";
+  EXPECT_EQ(config.parameters[1].initialValue, 0.31) << "D exponent";
+  EXPECT_EQ(config.parameters[2].idValue, 1.5e-35);
+  EXPECT_EQ(config.constraints.at(0).rightEquation, "Depth");
+  EXPECT_EQ(config.period.start, (DateRecord{2001, 1, 31}));
+  EXPECT_EQ(config.period.end, (DateRecord{2003, 12, 31, 24})) << "a date between quotes";
+  EXPECT_EQ(config.measures.at(0).simulation.itemNo, 2);
+  EXPECT_EQ(config.measures.at(0).observation.fileName, folder_ / "gauge.csv");
+  EXPECT_EQ(config.measures.at(1).measurementNo, 3);
+  EXPECT_THAT(config.objectives.at(0).measures, ElementsAre(0U));
+  EXPECT_FALSE(config.objectives[0].standardDeviation.has_value());
+  EXPECT_EQ(config.measureFile, folder_ / "model/measures.txt");
+  EXPECT_EQ(config.optimisation.pse.populationSize, 20);
+  EXPECT_EQ(config.optimisation.simplex.pointCount, 5);
+  EXPECT_EQ(config.randomSeed, -77);
+  EXPECT_EQ(config.simultaneousSimulations, 4);
+  EXPECT_EQ(config.plannedEvaluations(), 500);
+}
+
+TEST_F(SetupReaderTest, PlansTheEvaluationsOfEachTask) {
+  const struct {
+    const char* edits;
+    int planned;
+  } cases[] = {
+      {"Option = 2 => 0 & Scenario_Type = 1 => 0", 1}, {"Option = 2 => 0", 1},   {"Option = 2 => 1", 5},
+      {"Option = 2 => 1 & Differencing = 1 => 0", 3},  {"Option = 2 => 3", 200}, {"Option = 2 => 4", 0},
+  };
+  for (const auto& row : cases) EXPECT_EQ(read(row.edits).plannedEvaluations(), row.planned) << row.edits;
+}
+
+TEST_F(SetupReaderTest, RefusesWhatCannotBeReadAndSaysWhere) {
+  const std::string longText(256, 'x');
+  const auto title = [](const std::string& text) { return "'Upper catchment   ' => '" + text + "'"; };
+  const struct {
+    std::string edits;
+    const char* section;  ///< whose keyword cannot be read
+    std::string detail;   ///< behind "setup.kdx:"
+  } keywords[] = {
+      {"    Option = 2 => ", "MIREVO_SIMULATION_OPTION",
+       "2:3: Option: the keyword is missing in section MIREVO_SIMULATION_OPTION"},
+      {"Lower_Bound = 6.5 => Lower_Bond = 6.5", "PARAMETER_3",
+       "39:5: Lower_Bound: the keyword is missing in section MODEL_PARAMETERS/PARAMETER_3; found \"Lower_Bond\", did "
+       "you mean \"Lower_Bound\"?"},
+      {"TqSEKdxListItemCount = 3 => ", "MODEL_PARAMETERS",
+       "19:3: TqSEKdxListItemCount: the keyword is missing in section MODEL_PARAMETERS"},
+      {"TqSEKdxListItemCount = 3 => -3", "MODEL_PARAMETERS",
+       "20:5: TqSEKdxListItemCount: expected 0 or more, found -3"},
+      {"Option = 2 => 2.0", "MIREVO_SIMULATION_OPTION", "3:14: Option: expected an integer within 32 bits, found 2.0"},
+      {"Option = 2 => 2147483648", "MIREVO_SIMULATION_OPTION",
+       "3:14: Option: expected an integer within 32 bits, found 2147483648"},
+      {"Option = 2 => 2, 3", "MIREVO_SIMULATION_OPTION", "3:17: Option: expected one value, found 2"},
+      {"'Upper catchment   ' => 2001-01-31", "MIREVO_SIMULATION_OPTION",
+       "4:13: Title: expected a text between quotes, found the date 2001-01-31 00:00"},
+      {title(longText), "MIREVO_SIMULATION_OPTION", "4:13: Title: expected a text of at most 255 bytes, found 256"},
+      {"'Depth'\n    [/P => ' '\n    [/P", "PARAMETER_1", "31:24: Parameter_Name: expected a name, found a blank text"},
+      {"'Depth'\n    [/P => 'a\tb'\n    [/P", "PARAMETER_1",
+       "31:24: Parameter_Name: expected a name without tabs, which separate the columns of the results"},
+      {"2001-01-31 => 'January'", "ObjectiveFunctions",
+       "58:18: Start_Date: expected a date such as 2001-01-31 or 2001-01-31 12:30, found the text \"January\""},
+      {"412.5, 1, 99 => 412.5, 'one', 99 & Option = 2 => 0", "SCENARIO_1",
+       "108:29: Parameters: expected a number, found the text \"one\""},
+  };
+  for (const auto& row : keywords) {
+    EXPECT_EQ(failure(row.edits), fmt::format("Error: Unable to read keyword in section {} in KDX file\nsetup.kdx:{}",
+                                              row.section, row.detail));
+  }
+  const struct {
+    const char* edits;
+    const char* error;
+  } others[] = {
+      {"Title = => Title", " setup.kdx\nsetup.kdx:4:11: expected '=' after keyword \"Title\""},
+      {"[MIREVO_PARAMETERS] => [MIREVO_PARAMETER] & [/MIREVO_PARAMETERS] => [/MIREVO_PARAMETER]",
+       " section MIREVO_PARAMETERS in KDX file\nsetup.kdx: expected section [MIREVO_PARAMETERS] in the file; found "
+       "\"MIREVO_PARAMETER\", did you mean \"MIREVO_PARAMETERS\"?"},
+      {"[SIMPARAM] => [SIMPARAMS] & [/SIMPARAM] => [/SIMPARAMS]",
+       " section SIMPARAM in KDX file\nsetup.kdx:2:3: expected section [SIMPARAM] in section MIREVO_SIMULATION_OPTION; "
+       "found \"SIMPARAMS\", did you mean \"SIMPARAM\"?"},
+      {"TqSEKdxListItemCount = 3 => 4",
+       " section PARAMETER_4 in KDX file\nsetup.kdx:19:3: expected section [PARAMETER_4] in section MODEL_PARAMETERS"},
+      {"[SimultaneousSimulations] => [Simultaneous] & [/SimultaneousSimulations] => [/Simultaneous]",
+       " section SimultaneousSimulations in KDX file\nsetup.kdx:1:1: expected section [SimultaneousSimulations] in "
+       "section MIREVO_PARAMETERS"},
+  };
+  for (const auto& row : others) EXPECT_EQ(failure(row.edits), std::string("Error: Unable to open") + row.error);
+  EXPECT_EQ(failure(title(longText.substr(1) + "   ")), "") << "trailing blanks do not count";
+  EXPECT_EQ(failure("'Depth + Rate' => 'Depth + Rate + " + std::string(1000, '0') + "'"), "") << "free text";
+}
+
+TEST_F(SetupReaderTest, StopsAtTheFirstInvalidValueBeforeLaterSectionsAreRead) {
+  EXPECT_THAT(
+      failure("Aggregation_Method = 0 => 9 & [SAVE_OUTPUT_FILES] => [SAVED] & [/SAVE_OUTPUT_FILES] => [/SAVED]"),
+      testing::StartsWith("Error: Objective function aggregation method invalid"));
+  EXPECT_THAT(failure("Option = 2 => 0 & [OPTIMISATION_ALGORITHM] => [X] & [/OPTIMISATION_ALGORITHM] => [/X] & "
+                      "NoSimultaneousSim = 4 => 0"),
+              testing::StartsWith("Error: Invalid No. of processes"))
+      << "a section that the run does not need may be absent";
+}
+
+TEST_F(SetupReaderTest, EchoesEverySectionAndValueInReadingOrder) {
+  const std::string log = logOf("Population_Size = 20 => 0");
+  EXPECT_THAT(log, testing::StartsWith("[MIREVO_PARAMETERS]\n"
+                                       "[MIREVO_SIMULATION_OPTION]\n"
+                                       "  Option = 2\n"
+                                       "  Title = 'Upper catchment'\n"
+                                       "  Restart = 0 (default)\n"
+                                       "  FailedRunFolders = 3 (default)\n"
+                                       "  Report = 1 (default)\n"
+                                       "[MIREVO_SIMULATION_OPTION/SIMBATCH]\n"
+                                       "  TqSEKdxListItemCount = 1\n"
+                                       "[MIREVO_SIMULATION_OPTION/SIMBATCH/SIMBATCHITEM_1]\n"
+                                       "  BatchFileName = 'model/run.sh'\n"
+                                       "  Arguments = '' (default)\n"
+                                       "[MIREVO_SIMULATION_OPTION/SIMPARAM]\n"));
+  EXPECT_THAT(log, HasSubstr("  KeyLine = 'soil'\n  KeyLine = 'depth'\n"));
+  EXPECT_THAT(log, HasSubstr("[MODEL_PARAMETERS/PARAMETER_3]\n"
+                             "  Initial_Value = 7\n"
+                             "  Lower_Bound = 6.5\n"
+                             "  Upper_Bound = 7.5\n"
+                             "  Transformation_Type = 0 (default)\n"
+                             "  Parameter_Type = 2\n"
+                             "  Parameter_IDValue = 1.5e-35\n"
+                             "  Parameter_Name = 'Sum'\n"
+                             "  Parameter_Equation = 'Depth + Rate'\n"
+                             "  Comment = '' (default)\n"));
+  EXPECT_THAT(log, HasSubstr("  Start_Date = 2001-01-31 00:00\n  End_Date = 2003-12-31 24:00\n"));
+  EXPECT_THAT(log, testing::EndsWith("[OPTIMISATION_ALGORITHM/PSE_CONTROL_PARAMETERS]\n"
+                                     "  Population_Size = 0\n"
+                                     "  No_Points_Simplex = 5\n"
+                                     "  Prob_Reflection = 0.6\n"
+                                     "  Prob_Contraction = 0.4\n"));
+}
+
+TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotRead) {
+  const struct {
+    const char* edits;
+    const char* warning;
+  } cases[] = {
+      {"Weight_Above = 2.5 => Weigth_Above = 2.5",
+       "setup.kdx:68:9: keyword \"Weigth_Above\" is unknown and not read, did you mean \"Weight_Above\"?"},
+      {"Min_Change = 0.005 => Min_Change = 0.005\nMin_Change = 1.0",
+       "setup.kdx:149:1: keyword \"Min_Change\" stands at line 148 already, this one is not read"},
+      {"[SCENARIOS] => [Scenario][/Scenario][SCENARIOS]",
+       "setup.kdx:103:3: section \"Scenario\" is unknown and not read, did you mean \"SCENARIOS\"?"},
+      {"TqSEKdxListItemCount = 3 => 2",
+       "setup.kdx:20:28: TqSEKdxListItemCount: 3 sections PARAMETER_n stand here, those beyond 2 are not read"},
+      {"Function_Name = 'Flow' => ''",
+       "setup.kdx:91:16: Name: no output measure has this Function_Name, the objective function is always 0"},
+      {"Use_Surrogate_Model = 1 => 2", "setup.kdx:123:27: Use_Surrogate_Model: neither 0 nor 1, no search will be run"},
+      {"Max_No_Evaluations = 500 => 3", "NoSimultaneousSim: only 3 can be used by the evaluations of this run"},
+      {"Option = 2 => 4", "setup.kdx:3:14: Option: no task has this number, nothing will be run"},
+      {"[/MIREVO_PARAMETERS] => [/MIREVO_PARAMETERS][MIREVO_PARAMETERS][/MIREVO_PARAMETERS]",
+       "a second [MIREVO_PARAMETERS] is not read"},
+  };
+  EXPECT_THAT(logOf("[SCENARIOS] => [TMEMPARAM]\nTmemOption = 1\n[/TMEMPARAM][SCENARIOS]"),
+              testing::Not(HasSubstr("Warning")));
+  for (const auto& row : cases) EXPECT_THAT(logOf(row.edits), HasSubstr(row.warning));
+}
+
+TEST_F(SetupReaderTest, WarnsOfSearchSettingsThatEndASearchEarly) {
+  const struct {
+    const char* edits;
+    const char* warning;  ///< empty: none of these
+  } cases[] = {
+      {"", ""},  // two variable parameters, 20 = 4(2n + 1) points
+      {"Population_Size = 20 => 19 & Neighbourhood_Size = 60 => 50",
+       "Population_Size: found 19, at least 20 are advised for the number of variable parameters"},
+      {"No_Points_Simplex = 5 => 2", "No_Points_Simplex: found 2, at least 3 are advised"},
+      {"Algorithm_Type = 1 => 0", ""},
+      {"Algorithm_Type = 1 => 0 & No_Points_Complex = 7 => 4 & No_Points_Subcomplex = 6 => 2",
+       "No_Points_Complex: found 4, at least 5 are advised"},
+      {"Algorithm_Type = 1 => 0 & No_Points_Subcomplex = 6 => 2",
+       "No_Points_Subcomplex: found 2, at least 3 are advised"},
+      {"Max_No_Evaluations = 500 => 19",
+       "Max_No_Evaluations: the initial sample of 20 sets is cut to 19, and no search follows"},
+      {"Max_No_Evaluations = 500 => 20", ""},
+      {"Max_No_Evaluations = 500 => 61", ""},
+      {"Max_No_Evaluations = 500 => 60",
+       "Max_No_Evaluations: found 60, the surrogate model chooses nothing before 60 model evaluations: it waits for "
+       "No_Initial_Generations = 2, and a quadratic polynomial for 6 sets"},
+      {"Population_Size = 20 => 2 & No_Points_Simplex = 5 => 2 & Neighbourhood_Size = 60 => 0 & "
+       "No_Initial_Generations = 2 => 1 & Max_No_Evaluations = 500 => 6",
+       "found 6, the surrogate model chooses nothing before 6 model evaluations: it waits for "
+       "No_Initial_Generations = 1, and a quadratic polynomial for 6 sets"},
+      {"Algorithm_Type = 1 => 0 & Max_No_Evaluations = 500 => 27",
+       "Max_No_Evaluations: the initial sample of 28 sets is cut to 27"},
+      {"Algorithm_Type = 1 => 2 & Max_No_Evaluations = 500 => 10", ""},
+  };
+  for (const auto& row : cases) {
+    const std::string log = logOf(row.edits);
+    if (*row.warning != '\0') {
+      EXPECT_THAT(log, HasSubstr(row.warning));
+    } else {
+      EXPECT_THAT(log, testing::AllOf(testing::Not(HasSubstr("advised")), testing::Not(HasSubstr("is cut to")),
+                                      testing::Not(HasSubstr("chooses nothing"))));
+    }
+  }
+}
+
+TEST_F(SetupReaderTest, TheSetupIsLookedForWhereItsNameSays) {
+  RunLog log;
+  EXPECT_EQ(withoutFolder(refusalOf([&] { readSetupFile(folder_ / "none.kdx  ", log); })),
+            "Error: Unable to open none.kdx\nNo such file or directory");
+  folder_.write("my.setup.KDX", edited(""));
+  EXPECT_EQ(readSetupFile(folder_ / "model/../my.setup.KDX", log).setupName, "my.setup");
+}
+
+}  // namespace
+}  // namespace mirevo

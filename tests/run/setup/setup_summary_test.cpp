@@ -1,0 +1,67 @@
+#include "run/setup/setup_summary.h"
+
+#include <tuple>
+
+#include <gtest/gtest.h>
+
+#include "run/setup_fixture.h"
+
+namespace mirevo {
+namespace {
+
+using SetupSummaryTest = SetupFixture;
+
+TEST_F(SetupSummaryTest, SaysWhatTheRunIsAboutToDo) {
+  RunConfig config = read("Weight = 0.75 => Weight = 0.75\nStandard_Deviation = 2.5");
+  config.baseFolder = "/base";
+  SearchSpace space;
+  space.names = {"Depth", "Rate"};
+  space.lower = {4.605170185988092, 0.0};
+  space.upper = {6.75, 1.0};
+  const int order[] = {1, 3, 2};
+  EXPECT_EQ(
+      setupSummary(config, space, order),
+      "Title: Upper catchment\n"
+      "Task: Parameter optimisation: Population Simplex Evolution with surrogate model\n"
+      "Base folder: /base\n"
+      "Batch items: 1, parameter files: 1, saved output files: 1\n"
+      "Model parameters: 3, of which variable: 2\n"
+      "  Depth: variable, initial value 412.5, bounds 100 to 900, transformation logarithmic, search from 4.60517 "
+      "to 6.75\n"
+      "  Rate: variable, initial value 0.31, bounds 0 to 1, transformation none, search from 0 to 1\n"
+      "  Sum: dependent, Depth + Rate\n"
+      "  order of evaluation: 1, 3, 2\n"
+      "  constraint: Rate <= Depth\n"
+      "Evaluation period: 2001-01-31 00:00 to 2003-12-31 24:00\n"
+      "Output measures: 2\n"
+      "  Flow error: root mean square, weight 1.25 (above 2.5), objective function Flow\n"
+      "  Written: written by the model, weight 1 (above 1), objective function none\n"
+      "Objective functions: 1\n"
+      "  Flow: sum of squares of 1 output measures, weight 0.75, standard deviation 2.5\n"
+      "Aggregation: No transformation\n"
+      "Random seed: -77\n"
+      "Model evaluations planned: 500 and a final model run\n"
+      "Surrogate model: quadratic polynomial fitted to the 60 nearest sets, chooses one of 4 proposals; loops without "
+      "it: 2\n"
+      "Simultaneous simulations: 4");
+}
+
+TEST(TaskName, SaysWhatIsRun) {
+  // The type of scenarios, differences or sampling.
+  for (const auto& [option, type, name] :
+       {std::tuple{0, 0, "Scenario runs: Single run using initial parameter set"},
+        {0, 1, "Scenario runs: Multiple runs"},
+        {1, 0, "Sensitivity analysis: Local sensitivity analysis, forward differences"},
+        {1, 1, "Sensitivity analysis: Local sensitivity analysis, central differences"},
+        {3, 0, "Uncertainty analysis: simple random sampling"},
+        {3, 1, "Uncertainty analysis: Latin hypercube sampling"},
+        {4, 0, "none"}}) {
+    RunConfig config;
+    config.simulationOption = static_cast<SimulationOption>(option);
+    config.scenario.scenarioType = config.sensitivity.local.differencing = config.uncertainty.uncertaintyType = type;
+    EXPECT_EQ(taskName(config), name);
+  }
+}
+
+}  // namespace
+}  // namespace mirevo

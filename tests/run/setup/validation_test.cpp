@@ -1,0 +1,221 @@
+#include "run/setup/validation.h"
+
+#include <gmock/gmock.h>
+
+#include "run/setup_fixture.h"
+
+namespace mirevo {
+namespace {
+
+using testing::HasSubstr;
+using testing::StartsWith;
+using ValidationTest = SetupFixture;
+
+struct Refused {
+  const char* edits;
+  std::string message;  ///< the first line behind "Error: ", whole
+  const char* detail;   ///< what the lines below it hold
+};
+
+const std::vector<Refused>& refusedValues() {
+  static const std::vector<Refused> cases = {
+      // The model and its files
+      {"TqSEKdxListItemCount = 1\n      [SIMBATCHITEM_1] => 0\n      [SIMBATCHITEM_1]",
+       "No model simulation sequence defined", "setup.kdx:6:30: TqSEKdxListItemCount: expected 1 or more, found 0"},
+      {"'model\\run.sh' => ' '", "No model simulation sequence defined", "setup.kdx:8:25: BatchFileName"},
+      {"'model\\run.sh' => 'model\\walk.sh'", "The file model\\walk.sh does not exist",
+       "setup.kdx:8:25: BatchFileName: model/walk.sh: No such file or directory"},
+      {"'model\\run.sh' => 'model'", "The file model does not exist", "Is a directory"},
+      {"TqSEKdxListItemCount = 1 // files => 0", "No model parameter files defined", "setup.kdx:12:30"},
+      {"'model/soil.par' => 'soil.par'", "The file soil.par is not located in the base folder ",
+       "setup.kdx:14:25: ParamFileName"},
+      {"'model/soil.par' => 'model/../modelling/soil.par'",
+       "The file model/../modelling/soil.par is not located in the base folder ", "found modelling/soil.par"},
+      {"'model/soil.par' => 'model/none.par'", "Unable to open model/none.par", "No such file"},
+      {"'model/soil.tpl' => 'model/none.tpl'", "Unable to open template file model/none.tpl",
+       "setup.kdx:15:28: TemplateFileName"},
+      {"'model/soil.tpl' => 'model/blank.tpl'", "Delimiter not defined in template file model/blank.tpl",
+       "model/blank.tpl:1:1: expected"},
+      {"'model/soil.tpl' => 'model/soil.par'", "The template file model/soil.par is a model parameter file, too",
+       "overwrites"},
+      // Parameters
+      {"TqSEKdxListItemCount = 3 => 0", "No model parameters defined", "setup.kdx:20:28"},
+      {"Lower_Bound = 100 => 412.6", "Initial parameter value smaller than lower bound for parameter Depth",
+       "setup.kdx:26:23: Initial_Value: expected 412.6 or more, found 412.5"},
+      {"Upper_Bound = 900 => 412", "Initial parameter value larger than upper bound for parameter Depth",
+       "expected 412 or less, found 412.5"},
+      {"Lower_Bound = 6.5 => 8.0", "Lower bound larger than upper bound for parameter Sum", "setup.kdx:41:21"},
+      {"Transformation_Type = 1 => 3", "Transformation type invalid for parameter Depth",
+       "setup.kdx:29:29: Transformation_Type: expected 0 to 2, found 3"},
+      {"Parameter_Type = 0 => -1", "Parameter type invalid for parameter Depth", "found -1"},
+      {"'Rate'\n    [/P => 'Depth  '\n    [/P", "Invalid parameter name Depth. Name used more than once.",
+       "setup.kdx:37:24"},
+      {"Lower_Bound = 100 => 0", "Invalid parameter transformation for parameter Depth",
+       "greater than 0 for a logarithmic parameter, found 0"},
+      {"Parameter_Type = 0 => 1 & Upper_Bound = 1.0 => Upper_Bound = 1.0\nParameter_Type = 1",
+       "No variable model parameters defined", "Parameter_Type = 0"},
+      {"Logical_Operator = 1 => 4", "Invalid logical operator in CONSTRAINT_1", "expected 0 to 3, found 4"},
+      {"Right_Equation = 'Depth' => ''", "Invalid equation for internal constraints", "Right_Equation"},
+      // Measures and objective functions
+      {"2001-01-31 => 2001-02-29", "Invalid date 2001 2 29 0 0", "setup.kdx:58:18: Start_Date"},
+      {"'2003-12-31 24:00' => 2003-12-31 24:01", "Invalid date 2003 12 31 24 1", "End_Date"},
+      {"'2003-12-31 24:00' => 2001-01-30", "End date of the evaluation period before its start date",
+       "expected 2001-01-31 00:00 or later, found 2001-01-30 00:00"},
+      {"Aggregation_Method = 0 => 4", "Objective function aggregation method invalid", "found 4"},
+      {"Interface_Type = 0 => 2", "Interface type invalid for output measure Flow error", "Interface_Type"},
+      {"Statistic_Type = 1 => 5", "Statistic type invalid for output measure Flow error", "Statistic_Type"},
+      {"Weight = 1.25 => -1.0E-9", "Weight invalid for output measure Flow error",
+       "Weight: expected 0 or more, found -1e-09"},
+      {"Weight_Above = 2.5 => -2.5", "Weight invalid for output measure Flow error", "Weight_Above: expected"},
+      {"MeasurementNo = 3 => 0", "Measurement No. invalid for output measure Written", "expected 1 or more"},
+      {"'model/flow.csv' => ''", "No output file defined for output measure No. 1", "setup.kdx:71:23"},
+      {"'gauge.csv' => ''", "No observation file defined for output measure No. 1", "File_Name"},
+      {"'model/flow.csv' => 'flow.csv'", "The file flow.csv is not located in the base folder ", "File_Name"},
+      {"Function_Name = 'Flow' => 'Flwo'", "Invalid function name for output measure Flow error",
+       "Function_Name: no objective function is called \"Flwo\""},
+      {"Function_Type = 2 => 3", "Function type invalid for objective function Flow", "found 3"},
+      {"Weight = 0.75 => -0.75", "Weight invalid for objective function Flow", "found -0.75"},
+      {"Weight = 0.75 => Standard_Deviation = 0.0", "Standard deviation invalid for objective function Flow",
+       "greater than 0"},
+      {"TqSEKdxListItemCount = 1\n      [OBJECTIVE_1] => 2\n      [OBJECTIVE_1] & [/OBJECTIVE_1] => "
+       "[/OBJECTIVE_1][OBJECTIVE_2]\nName = 'Flow'\n[/OBJECTIVE_2]",
+       "Invalid objective function name Flow. Name used more than once.", "setup.kdx:95:8"},
+      {"TqSEKdxListItemCount = 1\n      [OBJECTIVE_1] => 0\n      [OBJECTIVE_1]", "No objective functions defined",
+       "found 0"},
+      {"TqSEKdxListItemCount = 2 => 0", "No output measures defined", "found 0"},
+      {"'model/out/flow.csv' => ''", "No output file defined to be saved", "File_name"},
+      {"'model/out/flow.csv' => '../flow.csv'", "The file ../flow.csv is not located in the base folder ", ""},
+      {"'model/measures.txt' => ''", "File containing output measures not defined", "Interface_Type = 1"},
+      {"'model/measures.txt' => '/tmp/measures.txt'", "The file /tmp/measures.txt is not located in the base folder ",
+       ""},
+      // Tasks
+      {"Option = 2 => 0 & Scenario_Type = 1 => 2", "Invalid scenario type selection", "found 2"},
+      {"Option = 2 => 0 & TqSEKdxListItemCount = 1\n      [SCENARIO_1] => 0\n      [SCENARIO_1]",
+       "No scenario runs defined", ""},
+      {"Option = 2 => 0 & 412.5, 1, 99 => 412.5, 1", "Invalid number of parameter values in SCENARIO_1",
+       "each of the 3 parameters, found 2"},
+      {"Option = 2 => 0 & 412.5, 1, 99 => 412.5, 1, 99, 7", "Invalid number of parameter values in SCENARIO_1",
+       "each of the 3 parameters, found 4"},
+      {"Option = 2 => 0 & 412.5, 1, 99 => 412.5, 1.01, 99", "Value for parameter Rate in SCENARIO_1 out of bounds",
+       "value 2: expected 0 to 1, found 1.01"},
+      {"Option = 2 => 1 & Sensitivity_Type = 0 => 1", "Invalid sensitivity type selection", "expected 0, found 1"},
+      {"Option = 2 => 1 & Differencing = 1 => 2", "Differencing option in local sensitivity analysis invalid", ""},
+      {"Option = 2 => 1 & Perturbation_Option = 0 => 2", "Perturbation option in local sensitivity analysis invalid",
+       ""},
+      {"Option = 2 => 1 & Perturbation_Fraction = 0.02 => 0",
+       "Perturbation fraction in local sensitivity analysis invalid", "expected greater than 0 and at most 1, found 0"},
+      {"Option = 2 => 1 & Perturbation_Fraction = 0.02 => 0.75",
+       "Perturbed value for parameter Depth in local sensitivity analysis out of bounds",
+       "0.75 of the range, from 412.5, leaves the bounds 100 to 900 both ways (logarithms)"},
+      {"Algorithm_Type = 1 => 3", "Invalid optimisation algorithm type selection", ""},
+      {"Upper_Bound = 1.0 => 0.31 & Lower_Bound = 0.0 => 0.31", "Lower bound equal to upper bound for parameter Rate",
+       "Parameter_Type = 1 fixes a parameter"},
+      {"Algorithm_Type = 1 => 0 & No_Complexes = 4 => 0", "No. of complexes in SCE algorithm invalid", ""},
+      {"Algorithm_Type = 1 => 0 & No_Points_Complex = 7 => 1", "No. of points in a complex in SCE algorithm invalid",
+       ""},
+      {"Algorithm_Type = 1 => 0 & No_Points_Subcomplex = 6 => 8",
+       "No. of points in a subcomplex in SCE algorithm invalid", "at most the 7 points of a complex, found 8"},
+      {"Algorithm_Type = 1 => 0 & No_Points_Subcomplex = 6 => 1",
+       "No. of points in a subcomplex in SCE algorithm invalid", "2 or more"},
+      {"Algorithm_Type = 1 => 0 & No_Evaluation_Steps = 8 => 0", "No. of evaluation steps in SCE algorithm invalid",
+       ""},
+      {"Population_Size = 20 => 0", "Population size in PSE algorithm invalid", ""},
+      {"No_Points_Simplex = 5 => 21", "No. of points in a simplex in PSE algorithm invalid", "at most the 20 points"},
+      {"Prob_Reflection = 0.6 => 1.1", "Probability for reflection step in PSE algorithm invalid",
+       "expected 0 to 1, found 1.1"},
+      {"Prob_Contraction = 0.4 => -0.1", "Probability for contraction step in PSE algorithm invalid", ""},
+      {"Prob_Contraction = 0.4 => 0.5",
+       "Sum of probabilities for reflection and contraction in PSE algorithm larger than 1", "found 0.6 + 0.5"},
+      {"Algorithm_Type = 1 => 2 & NoSimultaneousSim = 4 => 1 & Perturbation_Parameter = 0.25 => 1.01",
+       "Perturbation parameter in DDS algorithm invalid", ""},
+      {"Algorithm_Type = 1 => 2 & NoSimultaneousSim = 4 => 1 & Max_No_Evaluations = 500 => 0",
+       "Maximum No. of model evaluations in DDS algorithm invalid", ""},
+      {"Initial_Sample_Generation = 4 => 5", "Initial sample generation method invalid", ""},
+      {"'sample.txt' => '/dev/zero'", "Unable to open /dev/zero", "Not a regular file"},
+      {"'sample.txt' => ''", "Unable to open ", "expected the name of a file, found a blank text"},
+      {"'sample.txt' => 'none.txt'", "Unable to open none.txt", "No such file"},
+      {"Max_No_Evaluations = 500 => 0", "Maximum No. of model evaluations invalid", ""},
+      {"No_Loops_Convergence = 12 => 0", "No. of loops for evaluation of convergence criterion invalid", ""},
+      {"Min_Change = 0.005 => -0.005", "Minimum change convergence criterion invalid", ""},
+      {"Model_Type = 0 => 2", "Invalid model type for surrogate modelling optimisation", ""},
+      {"Neighbourhood_Size = 60 => 5", "Invalid neighbourhood size for surrogate modelling optimisation",
+       "at least the 6 coefficients of a quadratic polynomial in 2 parameters, or 0"},
+      {"Sampling_rate = 30 => 101", "Invalid sampling rate for surrogate modelling optimisation", "expected 1 to 100"},
+      {"No_Initial_Generations = 2 => 0", "Invalid no of initial generations for surrogate modelling optimisation", ""},
+      {"Neighbourhood_Size = 60 => 61",
+       "Population size and/or initial No. of generations too small for surrogate modelling optimisation",
+       "Neighbourhood_Size = 61 evaluated sets before the surrogate is fitted, found 60"},
+      {"Option = 2 => 3 & Uncertainty_Type = 1 => 2", "Invalid uncertainty estimation type selection", ""},
+      {"Option = 2 => 3 & Sample_Size = 200 => 1", "Sample size in uncertainty estimation invalid", ""},
+      {"Option = 2 => 3 & Standard_Deviation = 0.3 => 0.0", "Standard deviation in uncertainty estimation invalid", ""},
+      {"NoSimultaneousSim = 4 => 0", "Invalid No. of processes", ""},
+      {"Algorithm_Type = 1 => 2", "Use Population Simplex Evolution algorithm for application with multiple processors",
+       "found 4"},
+      {"Algorithm_Type = 1 => 0", "Use Population Simplex Evolution algorithm for application with multiple processors",
+       ""},
+      // Scale and location that nothing can give
+      {"Option = 2 => 3 & Aggregation_Method = 0 => 1",
+       "Standard deviation and location not defined for objective function Flow",
+       "Standard_Deviation: expected the keyword, which aggregation method 1 needs"},
+      {"Algorithm_Type = 1 => 2 & Aggregation_Method = 0 => 2 & Weight = 0.75 => Standard_Deviation = 2.5",
+       "Standard deviation and location not defined for objective function Flow", "Location: expected"},
+  };
+  return cases;
+}
+
+TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
+  for (const Refused& row : refusedValues()) {
+    const std::string error = failure(row.edits);
+    const std::string message = error.substr(0, error.find('\n'));
+    SCOPED_TRACE(row.edits);
+    // The base folder at the end of a message is this machine's.
+    EXPECT_THAT(message, StartsWith("Error: " + row.message));
+    EXPECT_TRUE(row.message.ends_with(' ') || message.size() == row.message.size() + 7) << message;
+    EXPECT_THAT(error.substr(std::min(error.size(), message.size() + 1)), HasSubstr(row.detail));
+    EXPECT_THAT(error, HasSubstr("\nsetup.kdx:")) << "every refusal names its place";
+  }
+}
+
+TEST_F(ValidationTest, AcceptsTheValuesAtTheEdgeOfWhatIsValid) {
+  const char* const cases[] = {
+      "No_Points_Simplex = 5 => 20",
+      "Algorithm_Type = 1 => 0 & NoSimultaneousSim = 4 => 1 & No_Points_Subcomplex = 6 => 7",
+      "Algorithm_Type = 1 => 2 & NoSimultaneousSim = 4 => 1 & Perturbation_Parameter = 0.25 => 0",
+      "Algorithm_Type = 1 => 2 & NoSimultaneousSim = 4 => 1 & Perturbation_Parameter = 0.25 => 1",
+      "Algorithm_Type = 1 => 2 & NoSimultaneousSim = 4 => 1 & Upper_Bound = 1.0 => 0.31 & Lower_Bound = 0.0 => 0.31",
+      "Upper_Bound = 1.0 => Upper_Bound = 0.31\nTransformation_Type = 2 & Lower_Bound = 0.0 => 0.31",
+      "Min_Change = 0.005 => 0",
+      "Weight = 1.25 => 0 & Weight_Above = 2.5 => 0 & Weight = 0.75 => 0",
+      "Sampling_rate = 30 => 100",
+      "Neighbourhood_Size = 60 => 6",
+      "Neighbourhood_Size = 60 => 0",
+      "Lower_Bound = 100 => 412.5",
+      "Upper_Bound = 900 => 412.5 & Lower_Bound = 100 => 100",
+      "'2003-12-31 24:00' => 2001-01-31T00:00",
+      "'2003-12-31 24:00' => 2003-12-31 23:60",
+      "'model/soil.tpl' => 'model/blank.tpl'\nFileType = 1",
+      "TqSEKdxListItemCount = 1\n    [OUTPUT_FILE_1] => 0\n    [OUTPUT_FILE_1]",
+      "Function_Name = 'Flow' => ''",
+      "Aggregation_Method = 0 => 2",
+      "Aggregation_Method = 0 => 3 & Option = 2 => 0",
+      "Option = 2 => 0 & Aggregation_Method = 0 => 1 & Weight = 0.75 => Standard_Deviation = 1.0\nLocation = -2",
+      "Option = 2 => 0 & 412.5, 1, 99 => 100, 1, -99",
+      "Option = 2 => 0 & Scenario_Type = 1 => 0 & 412.5, 1, 99 => 1",
+      "Option = 2 => 1 & Perturbation_Fraction = 0.02 => 0.6",
+      "Option = 2 => 3",
+      "Option = 2 => 3 & Sample_Size = 200 => 2",
+  };
+  for (const char* edits : cases) EXPECT_EQ(failure(edits), "") << edits;
+}
+
+TEST_F(ValidationTest, RefusesAModelFileThatBearsTheNameOfTheSetup) {
+  folder_.write("Setup.SH", "#!/bin/sh\n");
+  EXPECT_THAT(failure("'model\\run.sh' => 'Setup.SH'"),
+              StartsWith("Error: Model simulation file and mirevo file are located in the same directory with an "
+                         "identical name\nsetup.kdx:8:25: BatchFileName: "));
+  folder_.write("setup.txt", "#!/bin/sh\n");
+  EXPECT_THAT(failure("'model\\run.sh' => 'setup.txt'"), "") << "an ending that no model setup has";
+}
+
+}  // namespace
+}  // namespace mirevo

@@ -1,0 +1,166 @@
+#include "run/tasks/tasks.h"
+
+#include <cmath>
+#include <utility>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "algorithms/searches/optimisation_driver.h"
+#include "refusal.h"
+
+namespace mirevo {
+namespace {
+
+using testing::DoubleEq;
+using testing::ElementsAre;
+
+/// Records what it is asked to evaluate; every result is good.
+class RecordingEvaluator final : public Evaluator {
+ public:
+  std::vector<EvaluationResult> evaluateParameterSets(std::span<const ParameterSet> sets, DispatchMode) override {
+    batches.emplace_back(sets.begin(), sets.end());
+    std::vector<EvaluationResult> results(sets.size());
+    for (std::size_t i = 0; i < sets.size(); ++i) {
+      results[i].number = ++count_;
+      results[i].objectiveValues = {sets[i].front()};
+      results[i].aggregate = sets[i].front();
+    }
+    return results;
+  }
+
+  std::vector<std::vector<ParameterSet>> batches;
+
+ private:
+  int count_ = 0;
+};
+
+ModelParameter parameter(const char* name, ParameterType type, TransformationType transformation) {
+  ModelParameter result;
+  result.name = name;
+  result.parameterType = type;
+  result.transformationType = transformation;
+  result.lowerBound = 0.5;
+  result.initialValue = 1.5;
+  result.upperBound = 9.5;
+  return result;
+}
+
+class TasksTest : public ::testing::Test {
+ protected:
+  TasksTest() {
+    config_.parameters = {parameter("a", ParameterType::variable, TransformationType::none),
+                          parameter("b", ParameterType::fixed, TransformationType::none),
+                          parameter("c", ParameterType::variable, TransformationType::logarithmic),
+                          parameter("d", ParameterType::variable, TransformationType::integer)};
+    config_.objectives.resize(1);
+    space_ = BuildSearchSpace(config_.parameters);
+  }
+  std::string run() { return runTask({config_, space_, evaluator_, log_}).terminationMessage; }
+
+  RunConfig config_;
+  SearchSpace space_;
+  RecordingEvaluator evaluator_;
+  RunLog log_;
+};
+
+TEST_F(TasksTest, MultipleRunsAreOneBatchAndComeBackToTheirModelValues) {
+  config_.scenario.scenarioType = 1;
+  config_.scenario.runs = {{0.1, 7.0, 2.0, 3.7}, {-4.0, 7.0, 412.5, 2.5}};
+  run();
+  ASSERT_EQ(evaluator_.batches.size(), 1U);
+  ASSERT_EQ(evaluator_.batches[0].size(), 2U);
+  EXPECT_THAT(ToModelScale(space_, evaluator_.batches[0][0]), ElementsAre(0.1, DoubleEq(2.0), 3.5));
+  EXPECT_THAT(ToModelScale(space_, evaluator_.batches[0][1]), ElementsAre(-4.0, DoubleEq(412.5), 2.5));
+}
+
+TEST_F(TasksTest, AScenarioValueWithoutALogarithmIsRefusedByRunAndParameter) {
+  config_.scenario.scenarioType = 1;
+  config_.scenario.runs = {{1.0, 1.0, 1.0, 1.0}, {1.0, 1.0, 0.0, 1.0}};
+  EXPECT_EQ(refusalOf([this] { run(); }),
+            "Error: Invalid parameter transformation for parameter c\n"
+            "Scenario run 2 has the value 0, which has no logarithm.");
+  EXPECT_TRUE(evaluator_.batches.empty());
+}
+
+TEST_F(TasksTest, ATaskThatDoesNotExistRunsNothingAndEndsNormally) {
+  config_.simulationOption = static_cast<SimulationOption>(7);
+  EXPECT_EQ(run(), "Normal termination");
+  config_.simulationOption = SimulationOption::sensitivityAnalysis;
+  config_.sensitivity.sensitivityType = 1;
+  EXPECT_EQ(run(), "Normal termination");
+  config_.simulationOption = SimulationOption::parameterOptimisation;
+  config_.optimisation.useSurrogateModel = 2;
+  EXPECT_EQ(run(), "Normal termination");
+  EXPECT_TRUE(evaluator_.batches.empty());
+}
+
+TEST_F(TasksTest, AfterEverySearchItsBestSetIsTheFinalModelRun) {
+  const struct {
+    AlgorithmType algorithm;
+    std::int32_t surrogate;
+  } cases[] = {{AlgorithmType::dds, 0}, {AlgorithmType::dds, 1}, {AlgorithmType::sce, 0},
+               {AlgorithmType::sce, 1}, {AlgorithmType::pse, 0}, {AlgorithmType::pse, 1}};
+  config_.simulationOption = SimulationOption::parameterOptimisation;
+  config_.optimisation.stopping.maxEvaluations = 90;
+  config_.optimisation.stopping.minChange = 0.0;
+  config_.optimisation.surrogate.neighbourhoodSize = 20;
+  config_.optimisation.surrogate.initialGenerations = 1;
+  for (const auto& c : cases) {
+    SCOPED_TRACE(testing::Message() << static_cast<int>(c.algorithm) << " " << c.surrogate);
+    config_.optimisation.algorithmType = c.algorithm;
+    config_.optimisation.useSurrogateModel = c.surrogate;
+    evaluator_.batches.clear();
+    EXPECT_EQ(run(), "Optimisation terminated: Maximum number of model evaluations reached");
+    ASSERT_GT(evaluator_.batches.size(), 2U);
+    const std::vector<ParameterSet> last = evaluator_.batches.back();
+    ASSERT_EQ(last.size(), 1U);
+    std::size_t evaluations = 0;
+    double best = last[0].front();
+    for (const auto& batch : evaluator_.batches) {
+      evaluations += batch.size();
+      for (const ParameterSet& set : batch) best = std::min(best, set.front());
+    }
+    EXPECT_EQ(last[0].front(), best);
+    EXPECT_EQ(evaluations, 91U) << "the budget and the final model run";
+  }
+}
+
+TEST_F(TasksTest, DynamicallyDimensionedSearchRunsWithoutTheSurrogateModelThatIsAskedFor) {
+  config_.simulationOption = SimulationOption::parameterOptimisation;
+  config_.optimisation.stopping.maxEvaluations = 20;
+  const std::string plain = run();
+  const auto batches = std::exchange(evaluator_.batches, {});
+  config_.optimisation.useSurrogateModel = 1;
+  EXPECT_EQ(run(), plain);
+  EXPECT_EQ(evaluator_.batches, batches);
+}
+
+/// Fails at a chosen step.
+class FailingSearch final : public SearchAlgorithm {
+ public:
+  explicit FailingSearch(int goodSteps) : goodSteps_(goodSteps) {}
+  SearchStatus initialise() override { return step(); }
+  SearchStatus advance() override { return step(); }
+  bool isTerminated() const override { return goodSteps_ < -2; }
+  const SearchSummary& summary() const override { return summary_; }
+
+ private:
+  SearchStatus step() { return goodSteps_-- > 0 ? kSearchOk : 3; }
+  int goodSteps_;
+  SearchSummary summary_;
+};
+
+TEST(RunSearch, AnyStepThatFailsIsFatalWithItsAlgorithmsText) {
+  for (const int goodSteps : {0, 1, 4}) {
+    for (const auto& [name, text] : {std::pair{"SCE", "Error: Invalid operation in SCE algorithm"},
+                                     {"PSE", "Error: Invalid operation in PSE algorithm"},
+                                     {"DDS", "Error: Invalid operation in DDS algorithm"}}) {
+      FailingSearch search(goodSteps);
+      EXPECT_EQ(refusalMessageOf([&, &algorithm = name] { runSearch(search, algorithm, {}); }), text);
+    }
+  }
+}
+
+}  // namespace
+}  // namespace mirevo
