@@ -1,0 +1,118 @@
+#include "common/data_table.h"
+
+#include <algorithm>
+#include <cmath>
+#include <limits>
+
+#include "common/text.h"
+
+namespace mirevo {
+namespace {
+
+std::string escaped(std::string_view text) {
+  std::string result;
+  for (const char c : text) {
+    switch (c) {
+      case '\t':
+        result += "\\t";
+        break;
+      case '\n':
+        result += "\\n";
+        break;
+      case '\\':
+        result += "\\\\";
+        break;
+      default:
+        result += static_cast<unsigned char>(c) < ' ' ? ' ' : c;
+    }
+  }
+  return result;
+}
+
+std::string unescaped(std::string_view text) {
+  std::string result;
+  for (std::size_t i = 0; i < text.size(); ++i) {
+    if (text[i] != '\\' || i + 1 == text.size()) {
+      result += text[i];
+      continue;
+    }
+    const char next = text[++i];
+    result += next == 't' ? '\t' : next == 'n' ? '\n' : next;
+  }
+  return result;
+}
+
+std::string cellText(const DataTable::Cell& cell) {
+  struct Text {
+    std::string operator()(std::int64_t number) const { return std::to_string(number); }
+    std::string operator()(double number) const { return formatReal(number); }
+    std::string operator()(const std::string& text) const { return escaped(text); }
+  };
+  return std::visit(Text{}, cell);
+}
+
+std::vector<std::string> cellsOf(std::string_view line) {
+  std::vector<std::string> cells;
+  for (;;) {
+    const std::size_t tab = line.find('\t');
+    cells.push_back(unescaped(line.substr(0, tab)));
+    if (tab == std::string_view::npos) return cells;
+    line.remove_prefix(tab + 1);
+  }
+}
+
+}  // namespace
+
+std::string dataTableRow(const std::vector<DataTable::Cell>& cells) {
+  std::string row;
+  for (std::size_t i = 0; i < cells.size(); ++i) {
+    if (i > 0) row += '\t';
+    row += cellText(cells[i]);
+  }
+  return row + '\n';
+}
+
+std::string dataTableHead(const DataTable& table) {
+  std::string text;
+  for (const std::string& line : table.headLines) text += "# " + escaped(line) + '\n';
+  return text + dataTableRow({table.columns.begin(), table.columns.end()});
+}
+
+std::string dataTableText(const DataTable& table) {
+  std::string text = dataTableHead(table);
+  for (const auto& row : table.rows) text += dataTableRow(row);
+  return text;
+}
+
+std::optional<std::size_t> ReadTable::column(std::string_view name) const {
+  const auto found = std::find(columns.begin(), columns.end(), name);
+  if (found == columns.end()) return std::nullopt;
+  return static_cast<std::size_t>(found - columns.begin());
+}
+
+ReadTable readDataTable(std::string_view text) {
+  ReadTable table;
+  for (std::size_t end = text.find('\n'); end != std::string_view::npos; end = text.find('\n')) {
+    std::string_view line = text.substr(0, end);
+    text.remove_prefix(end + 1);
+    if (!line.empty() && line.back() == '\r') line.remove_suffix(1);
+    if (line.empty()) continue;
+    if (line.front() == '#') {
+      if (table.columns.empty()) table.headLines.push_back(unescaped(trim(line.substr(1))));
+    } else if (table.columns.empty()) {
+      table.columns = cellsOf(line);
+    } else if (auto cells = cellsOf(line); cells.size() == table.columns.size()) {
+      table.rows.push_back(std::move(cells));
+    }
+  }
+  return table;
+}
+
+std::optional<double> realCell(std::string_view cell) {
+  if (cell == "NaN") return std::numeric_limits<double>::quiet_NaN();
+  if (cell == "Inf") return std::numeric_limits<double>::infinity();
+  if (cell == "-Inf") return -std::numeric_limits<double>::infinity();
+  return parseReal(cell);
+}
+
+}  // namespace mirevo

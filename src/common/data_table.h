@@ -1,0 +1,50 @@
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <variant>
+#include <vector>
+
+namespace mirevo {
+
+/// A table for programs to read: what a run found, typed and at full precision. As a file it is tab-separated text
+/// below
+/// `#` lines, which spreadsheets, R and pandas read as it stands.
+struct DataTable {
+  using Cell = std::variant<std::int64_t, double, std::string>;
+
+  std::string name;                    ///< "Covariance": its file is `<setup>_Covariance.dat`
+  std::vector<std::string> headLines;  ///< for people, without "# "
+  std::vector<std::string> columns;
+  std::vector<std::vector<Cell>> rows;  ///< one cell per column
+};
+
+/// The table as text: `#` head lines, a header row, one line per row. Reals read back as the same 64 bits ("NaN",
+/// "Inf",
+/// "-Inf" for the others); a tab, a line end or a backslash in a text is written as `\t`, `\n` or `\\`.
+std::string dataTableText(const DataTable& table);
+/// One row as dataTableText() has it, line end included.
+std::string dataTableRow(const std::vector<DataTable::Cell>& cells);
+/// The `#` lines and the header row alone: the beginning of a file that grows row by row.
+std::string dataTableHead(const DataTable& table);
+
+/// A table read back; all cells are texts, taken as the reader wants them.
+struct ReadTable {
+  std::vector<std::string> headLines;
+  std::vector<std::string> columns;
+  std::vector<std::vector<std::string>> rows;  ///< whole rows only: a last line without its line end is left out
+
+  /// The 0-based number of a column; nothing when there is none of that name.
+  std::optional<std::size_t> column(std::string_view name) const;
+};
+
+/// Reads the text of a table. Any text is taken; rows with another number of cells than the header row are left out.
+ReadTable readDataTable(std::string_view text);
+
+/// A cell as the number that dataTableText() wrote; nothing when it is none.
+std::optional<double> realCell(std::string_view cell);
+
+}  // namespace mirevo
