@@ -144,8 +144,8 @@ void Calibration::writeModel(const std::string& fixedParameters) const {
 ModelDescription Calibration::describe() const {
   ModelDescription description;
   description.baseFolder = folder_ + "/base";
-  description.parameterFiles = {
-      {0, description.baseFolder + "/parameters.txt", description.baseFolder + "/parameters.tpl"}};
+  description.parameterFiles = {{TemplateType::delimiter, description.baseFolder + "/parameters.txt",
+                                 description.baseFolder + "/parameters.tpl"}};
   OutputMeasure measure;
   measure.name = "rms";
   measure.statisticType = StatisticType::rootMeanSquare;

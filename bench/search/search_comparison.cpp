@@ -29,6 +29,9 @@ constexpr int kSurrogateTrials = 20;
 constexpr int kSuccessBudget = 25000;
 constexpr int kSurrogateBudget = 6000;
 
+constexpr auto kQuadratic = SurrogateModelType::quadraticPolynomial;
+constexpr auto kGaussian = SurrogateModelType::gaussianProcess;
+
 enum class Method { sce, pse, dds };
 
 struct Setting {
@@ -36,7 +39,7 @@ struct Setting {
   int complexes = 2;  ///< the population is as many times 2n + 1 points, for PSE too
   int budget = kSuccessBudget;
   int samplingRate = 100;  ///< below 100 with the surrogate model
-  int modelType = 0;
+  SurrogateModelType modelType = SurrogateModelType::quadraticPolynomial;
   bool stopsAtTarget = false;
   int extraPoints = 0;               ///< points per complex beyond n + 1; 0: n, that is, 2n + 1 points
   bool goesOnWhenConverged = false;  ///< up to the budget, whatever the stopping tests say
@@ -59,7 +62,7 @@ Outcome runTrial(const TestFunction& function, const Setting& setting, int seed)
   const StoppingCriteria stopping{setting.budget, 1000000000, 0.0};
   const SearchProblem problem{bounds,
                               stopping,
-                              InitialSampleSettings{false, 1, ""},
+                              InitialSampleSettings{false, SampleGeneration::latinHypercube, ""},
                               {},
                               evaluator,
                               random,
@@ -155,7 +158,7 @@ void printBudget() {
 void printSmallComplexes() {
   for (const bool goesOn : {false, true}) {
     fmt::print("\nMean / median best value of SCE with 5 complexes after 5000 evaluations over {} trials{}\n\n",
-               kTrials, goesOn ? ", converged populations going on" : "");
+               kTrials, goesOn ? ", without the test of the population's range" : "");
     fmt::print("| function | m = n + 2 | m = n + 4 | m = n + 6 | m = 2n + 1 |\n|---|---|---|---|---|\n");
     for (const std::string name : {"Griewank 10-D", "Ackley 10-D", "Rastrigin 10-D", "Rosenbrock 10-D"}) {
       const TestFunction function = testing::testFunction(name);
@@ -181,7 +184,8 @@ void printSurrogate() {
     const TestFunction function = testing::testFunction(name);
     for (const Method method : {Method::sce, Method::pse}) {
       fmt::print("| {} | {} |", name, method == Method::sce ? "SCE" : "PSE");
-      for (const auto& [rate, model] : {std::pair{100, 0}, {50, 0}, {25, 0}, {50, 1}, {25, 1}}) {
+      for (const auto& [rate, model] :
+           {std::pair{100, kQuadratic}, {50, kQuadratic}, {25, kQuadratic}, {50, kGaussian}, {25, kGaussian}}) {
         const Setting setting{method, 4, kSurrogateBudget, rate, model, true};
         fmt::print(" {} |", successText(runTrials(function, setting, true, kSurrogateTrials)));
       }

@@ -145,4 +145,14 @@ std::vector<std::string_view> splitLines(std::string_view text) {
   return lines;
 }
 
+std::string columnName(std::string_view name) {
+  std::string harmless(trim(name));
+  for (char& c : harmless) {
+    if (static_cast<unsigned char>(c) < ' ') c = ' ';
+    if (c == '#') c = '_';   // would start a comment in the middle of the header row
+    if (c == '"') c = '\'';  // would open a quoted field that swallows its neighbours
+  }
+  return harmless;
+}
+
 }  // namespace mirevo

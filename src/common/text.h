@@ -41,4 +41,7 @@ std::optional<std::string> nearestName(std::string_view name, std::span<const st
 /// The lines of `text`, without their line ends (LF or CRLF); a last line without an end counts.
 std::vector<std::string_view> splitLines(std::string_view text);
 
+/// A name as a column's heading: nothing in it that a reader of tab-separated values takes for something else.
+std::string columnName(std::string_view name);
+
 }  // namespace mirevo

@@ -140,7 +140,7 @@ std::vector<std::string> ModelRunner::readTemplates() {
   const std::vector<ModelParameter>& parameters = parameters_.parameters();
   for (const ParameterFileItem& item : description_.parameterFiles) {
     const std::string name(trimTrailing(item.templateFileName));
-    const bool isNumericId = item.fileType == kNumericIdTemplate;
+    const bool isNumericId = item.templateType == TemplateType::numericId;
     std::string reason;
     const auto text = readTextFile(name, reason);
     if (!text)

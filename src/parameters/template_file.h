@@ -6,17 +6,21 @@
 #include <string_view>
 #include <vector>
 
+#include "common/settings/code_name.h"
 #include "parameters/model_parameter.h"
 
 namespace mirevo {
 
-inline constexpr std::int32_t kNumericIdTemplate = 1;     ///< `FileType`; any other value is a delimiter template
 inline constexpr char kConvertedDelimiter = '!';          ///< of a converted numeric-ID template
 inline constexpr std::size_t kMaximumLineLength = 50000;  ///< of a template line, in bytes
 
+/// How a template marks the places of values; any other number is a delimiter template, too.
+enum class TemplateType : std::int32_t { delimiter = 0, numericId = 1 };
+inline constexpr CodeName kTemplateTypeNames[] = {{0, "delimiter"}, {1, "numeric ID"}};
+
 /// One model parameter file of the setup. File names are absolute, in or below the base folder.
 struct ParameterFileItem {
-  std::int32_t fileType = 0;
+  TemplateType templateType = TemplateType::delimiter;
   std::string paramFileName;
   std::string templateFileName;
 };

@@ -106,12 +106,12 @@ std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::stri
   return bands;
 }
 
-std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, const SearchSpace& space,
-                                                       const ResultTable& results) {
+std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, const SensitivitySettings& settings,
+                                                       const SearchSpace& space, const ResultTable& results) {
   const auto isBase = [](const ResultTable::Row& row) { return row.number == 1 && row.ok; };
   if (std::none_of(results.rows.begin(), results.rows.end(), isBase)) return std::nullopt;
   EarlierResults evaluator(config, space, results);
-  const LocalSensitivity found = localSensitivity(config.sensitivity.local, space, evaluator);
+  const LocalSensitivity found = localSensitivity(settings, space, evaluator);
   ReportedSensitivity reported;
   reported.parameters = space.names;
   for (const OutputMeasure& measure : config.measures) reported.outputs.push_back(measure.name);

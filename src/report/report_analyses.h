@@ -6,6 +6,7 @@
 #include <string>
 #include <vector>
 
+#include "algorithms/analyses/local_sensitivity.h"
 #include "parameters/search_space.h"
 #include "report/report_data.h"
 #include "run/results/result_table.h"
@@ -22,7 +23,7 @@ std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::stri
 
 /// What a local sensitivity analysis found, computed again from its rows; nothing while the run with the initial values
 /// is not there.
-std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, const SearchSpace& space,
-                                                       const ResultTable& results);
+std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, const SensitivitySettings& settings,
+                                                       const SearchSpace& space, const ResultTable& results);
 
 }  // namespace mirevo

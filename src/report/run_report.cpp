@@ -28,27 +28,11 @@
 #include "run/results/result_table.h"
 #include "run/results/run_lock.h"
 #include "run/setup/setup_summary.h"
-#include "run/tasks/search_factory.h"
-#include "run/tasks/tasks.h"
 
 namespace mirevo {
 namespace {
 
 constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
-
-std::string taskKey(SimulationOption option) {
-  switch (option) {
-    case SimulationOption::scenarioRuns:
-      return "scenarios";
-    case SimulationOption::sensitivityAnalysis:
-      return "sensitivity";
-    case SimulationOption::parameterOptimisation:
-      return "optimisation";
-    case SimulationOption::uncertaintyAnalysis:
-      return "uncertainty";
-  }
-  return {};
-}
 
 /// Local time at which the file was last written; empty where there is none.
 std::string timeOfFile(const std::string& path) {
@@ -109,7 +93,7 @@ class ReportBuilder final {
 };
 
 bool ReportBuilder::readResults(std::string& reason) {
-  const std::string_view ending = resultFileEnding(config_);
+  const std::string_view ending = config_.resultFileEnding();
   if (ending.empty()) {
     reason = "the setup names no task that has results";
     return false;
@@ -149,11 +133,11 @@ ReportData ReportBuilder::build(const std::optional<RunEnding>& ending) {
   addFailures();
   addSeries();
   const bool isFinished = data_.run.state == RunStateShown::finished;
-  if (config_.simulationOption == SimulationOption::uncertaintyAnalysis && isFinished) {
-    data_.bands = reportedBands(config_, filePrefix_);
-  }
-  if (config_.simulationOption == SimulationOption::sensitivityAnalysis) {
-    data_.sensitivity = reportedSensitivity(config_, space(), table_);
+  if (!config_.task) return std::move(data_);
+  const TaskReport task = config_.task->report();
+  if (task.hasBands && isFinished) data_.bands = reportedBands(config_, filePrefix_);
+  if (task.sensitivity != nullptr) {
+    data_.sensitivity = reportedSensitivity(config_, *task.sensitivity, space(), table_);
   }
   return std::move(data_);
 }
@@ -173,29 +157,22 @@ void ReportBuilder::addRun() {
   run.title = config_.title;
   run.setupFile = std::filesystem::path(config_.setupFile).filename().string();
   run.setupName = config_.setupName;
-  run.task = taskKey(config_.simulationOption);
-  run.taskName = taskName(config_);
+  run.taskName = config_.taskDescription();
   run.started = valueOf(table_.headLines, "Started: ");
   run.reportMade = dateAndTimeNow();
-  run.planned = config_.plannedEvaluations();
-  const bool isSearch = config_.simulationOption == SimulationOption::parameterOptimisation;
-  if (isSearch) ++run.planned;  // the final model run with the best set has a number, too
+  run.planned = config_.plannedModelRuns();  // the final model run with the best set has a number, too
   run.aggregation = config_.aggregationMethod == AggregationMethod::zero
                         ? "every aggregate is 0"
                         : aggregationMethodName(config_.aggregationMethod);
   run.periodStart = formatDate(config_.period.start);
   run.periodEnd = formatDate(config_.period.end);
-  if (isSearch || config_.simulationOption == SimulationOption::uncertaintyAnalysis) run.seed = config_.randomSeed;
-  if (!isSearch) return;
-  const OptimisationConfig& search = config_.optimisation;
-  run.algorithm = searchShortName(search.algorithmType);
-  if (search.algorithmType == AlgorithmType::dds) return;
-  run.populationSize = search.algorithmType == AlgorithmType::sce
-                           ? search.sce.complexCount * search.sce.pointsPerComplex
-                           : search.pse.populationSize;
-  if (search.useSurrogateModel == 1) {
-    run.surrogate = search.surrogate.modelType == 1 ? "Gaussian process" : "quadratic polynomial";
-  }
+  if (!config_.task) return;
+  run.task = config_.task->facts().name.name;
+  if (config_.drawsRandomNumbers()) run.seed = config_.task->randomSeed;
+  const TaskReport task = config_.task->report();
+  run.algorithm = task.algorithm;
+  run.populationSize = task.populationSize;
+  run.surrogate = task.surrogate;
 }
 
 void ReportBuilder::addEnding(const std::optional<RunEnding>& ending) {

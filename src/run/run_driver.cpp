@@ -16,16 +16,16 @@
 #include "evaluation/ranks/mpi_evaluator.h"
 #include "measures/period_series.h"
 #include "platform/processes/posix_process_launcher.h"
-#include "platform/terminal/front_end.h"
 #include "platform/signals/signal_state.h"
+#include "platform/terminal/front_end.h"
 #include "report/run_report.h"
+#include "run/results/record_file.h"
 #include "run/run_model.h"
 #include "run/setup/setup_reader.h"
 #include "run/setup/setup_summary.h"
 #include "run/setup/setup_warnings.h"
 #include "run/signal_handlers.h"
 #include "run/stop_run.h"
-#include "run/tasks/tasks.h"
 #include "run/worker_run.h"
 
 namespace mirevo {
@@ -65,11 +65,9 @@ int RunDriver::run(const std::string& setupFileName) {
     // Not before earlier results have been renamed: where they lie in the base folder, workers look at them.
     if (state_.mpiInUse) beginWorkers(state_.mpi, {config_.setupFile, setupText});
     state_.progress.writeMessage("Title: " + config_.title);
-    state_.progress.writeStatus(taskName(config_));
+    state_.progress.writeStatus(config_.taskDescription());
     state_.progress.progressEvaluationLabel(config_.plannedModelRuns());
-    finish(runTask({config_, parameters_->searchSpace(), *evaluator_, state_.log,
-                    [this](const SearchSummary& summary) { reporter_->takeBestOf(summary); }, filePrefix_,
-                    runner_->observedSeries()}));
+    finish(runTask());
     return 0;
   } catch (const FatalError& error) {
     return endInError(error.message(), error.detail());
@@ -132,7 +130,7 @@ void RunDriver::buildModel() {
   aggregator_ = std::make_unique<ObjectiveAggregator>(config_.objectives, config_.aggregationMethod);
   // Before the process folders are made anew: a run that cannot be taken up again leaves everything as it is.
   results_.emplace(config_, parameters_->searchSpace(), filePrefix_);
-  config_.optimisation.earlierSearches = results_->earlierSearches();
+  if (config_.task) config_.task->earlierSearches = results_->earlierSearches();
   launcher_ = std::make_unique<PosixProcessLauncher>();
   signalState.haltProcesses = haltProcessesFromSignal;
   const int slotCount = state_.mpiInUse ? 0 : config_.simultaneousSimulations;  // the master runs no model
@@ -218,6 +216,16 @@ void RunDriver::openSeries() {
     series_->resume(earlier.value_or(std::string{}));
   }
   reporter_->recordSeries(*series_);
+}
+
+TaskOutcome RunDriver::runTask() {
+  if (!config_.task) return {std::string(kEndOfTask)};
+  TaskOutcome outcome = config_.task->run({parameters_->searchSpace(), config_.parameters, config_.measures,
+                                           config_.objectives, *evaluator_, state_.log,
+                                           [this](const SearchSummary& summary) { reporter_->takeBestOf(summary); },
+                                           filePrefix_, runner_->observedSeries()});
+  for (const TaskFile& file : outcome.files) writeBesideResults(file.path, file.content);
+  return outcome;
 }
 
 std::vector<std::string> RunDriver::closingLines(std::string_view terminationMessage) const {

@@ -19,7 +19,7 @@
 #include "run/run_reporter.h"
 #include "run/run_state.h"
 #include "run/setup/run_config.h"
-#include "run/tasks/tasks.h"
+#include "run/tasks/task.h"
 
 namespace mirevo {
 
@@ -46,6 +46,8 @@ class RunDriver final {
   void openResults();
   void putEarlierReportAside();
   void openSeries();
+  /// Runs the task, where there is one, and writes the files that it gives.
+  TaskOutcome runTask();
   /// False, with the system's reason, when the results could not be brought to their end. `report`: what the task
   /// found.
   bool closeResults(std::string_view terminationMessage, std::string& reason, std::span<const std::string> report = {});

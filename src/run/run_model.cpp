@@ -9,7 +9,6 @@
 #include <fmt/format.h>
 
 #include "common/text.h"
-#include "run/tasks/tasks.h"
 
 namespace mirevo {
 ModelDescription describeModel(const RunConfig& config) {
@@ -21,10 +20,10 @@ ModelDescription describeModel(const RunConfig& config) {
   model.measureFile = config.measureFile;
   model.period = config.period;
   model.objectives = config.objectives;
-  model.savedFiles = config.savedOutputFiles;
+  for (const SavedOutputFile& file : config.savedOutputFiles) model.savedFiles.push_back(file.fileName);
   model.savedFolder = fmt::format("{}/{}_Saved", config.setupFolder, config.setupName);
   model.failedFolderPrefix = processFolderPrefix(config) + "_Failed";
-  model.keepSimulatedValues = keepsSimulatedValues(config);
+  model.keepSimulatedValues = config.keepsSimulatedValues();
   return model;
 }
 

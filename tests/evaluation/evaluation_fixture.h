@@ -48,7 +48,8 @@ class EvaluationTest : public testing::Test {
     folder_.write("observed.csv", series(1.0));
     description_.baseFolder = folder_ / "base";
     description_.fileTag = "_tag";
-    description_.parameterFiles = {{0, folder_ / "base/parameters.txt", folder_ / "base/parameters.tpl"}};
+    description_.parameterFiles = {
+        {TemplateType::delimiter, folder_ / "base/parameters.txt", folder_ / "base/parameters.tpl"}};
     OutputMeasure measure;
     measure.name = "bias";
     measure.simulation = {folder_ / "base/simulated.csv", 1};
@@ -73,8 +74,8 @@ class EvaluationTest : public testing::Test {
     dependent.name = "inverse";
     dependent.parameterType = ParameterType::dependent;
     dependent.equation = "1 / (a - 5)";
-    parameters_ =
-        std::make_unique<ParameterModel>(std::vector{a, dependent}, std::vector<InternalConstraint>{{"a", "9", 0}});
+    parameters_ = std::make_unique<ParameterModel>(std::vector{a, dependent},
+                                                   std::vector<InternalConstraint>{{"a", "9", LogicalOperator::less}});
   }
 
   /// Five daily values from 2001-01-01 on.

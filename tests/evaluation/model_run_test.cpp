@@ -218,7 +218,7 @@ TEST_F(ModelRunTest, SavedFilesAreThoseThatTheRunWrote) {
 
 TEST_F(ModelRunTest, NumericIdTemplatesAreConvertedIntoTheSlotsAlone) {
   folder_.write("base/parameters.tpl", "a = 1.5E-035\n");
-  description_.parameterFiles[0].fileType = kNumericIdTemplate;
+  description_.parameterFiles[0].templateType = TemplateType::numericId;
   makeRunner(launcher_, 2);
   writes("simulated.csv", series(4.0));
   EXPECT_TRUE(evaluate(2.5).ok());
@@ -230,7 +230,8 @@ TEST_F(ModelRunTest, NumericIdTemplatesAreConvertedIntoTheSlotsAlone) {
 
 TEST_F(ModelRunTest, CrossSectionFilesHaveTheirResistanceNumbersUpdated) {
   folder_.write("base/river.QCSR", "");
-  description_.parameterFiles.push_back({0, folder_ / "base/river.QCSR", folder_ / "base/parameters.tpl"});
+  description_.parameterFiles.push_back(
+      {TemplateType::delimiter, folder_ / "base/river.QCSR", folder_ / "base/parameters.tpl"});
   makeRunner(launcher_, 1);
   writes("simulated.csv", series(4.0));
   EXPECT_TRUE(evaluate(2.0).ok());
@@ -260,7 +261,7 @@ TEST_F(ModelRunTest, WhatCannotWorkIsRefusedBeforeAModelRuns) {
   description_.parameterFiles[0].templateFileName = folder_ / "base/missing.tpl";
   EXPECT_EQ(refusal(),
             "Error: Unable to open template file " + (folder_ / "base/missing.tpl") + "\nNo such file or directory");
-  description_.parameterFiles[0].fileType = kNumericIdTemplate;
+  description_.parameterFiles[0].templateType = TemplateType::numericId;
   EXPECT_EQ(refusal(), "Error: Unable to open " + (folder_ / "base/missing.tpl") + "\nNo such file or directory");
   description_ = good;
   description_.measures[0].simulation.fileName = folder_ / "base_other/simulated.csv";

@@ -16,7 +16,7 @@ namespace mirevo {
 /// `edits`, a text "from => to & from => to": the one place where `from` stands becomes `to`. Behind an assignment `to`
 /// is the value alone ("Option = 2 => 0"), unless it is empty or an assignment itself.
 class SetupFixture : public testing::Test {
- protected:
+ public:
   SetupFixture() {
     folder_.write("model/run.sh", "#!/bin/sh\n");
     folder_.write("model/soil.par", "0\n");
@@ -36,13 +36,45 @@ class SetupFixture : public testing::Test {
       const auto value = from.find(" = ");
       if (value != std::string::npos && !to.empty() && to.find(" = ") == std::string::npos)
         to.insert(0, from.substr(0, value + 3));
-      const auto place = text.find(from);
-      EXPECT_NE(place, std::string::npos) << from;
-      if (place == std::string::npos) continue;
-      EXPECT_EQ(text.find(from, place + 1), std::string::npos) << from << " stands more than once";
-      text.replace(place, from.size(), to);
+      const auto location = text.find(from);
+      EXPECT_NE(location, std::string::npos) << from;
+      if (location == std::string::npos) continue;
+      EXPECT_EQ(text.find(from, location + 1), std::string::npos) << from << " stands more than once";
+      text.replace(location, from.size(), to);
     }
     return text;
+  }
+
+  /// The setup with a keyword of a section ("MODEL_PARAMETERS/PARAMETER_n", of items the first) set to a value as it is
+  /// to be written.
+  static std::string withValue(std::string text, std::string_view section, std::string_view keyword,
+                               std::string_view value) {
+    std::size_t at = 0;
+    for (std::string_view rest = section; !rest.empty();) {
+      std::string name(rest.substr(0, rest.find('/')));
+      rest.remove_prefix(std::min(rest.size(), name.size() + 1));
+      if (name.ends_with("_n")) name.back() = '1';
+      at = text.find("[" + name + "]", at);
+      EXPECT_NE(at, std::string::npos) << section;
+      at += name.size() + 2;
+    }
+    const std::string name(section.substr(section.rfind('/') + 1));
+    const std::size_t end = std::min(text.find("[/", at), text.find("[", at + 1));
+    const std::string assignment = std::string(keyword) + " = ";
+    const std::size_t old = text.find(" " + assignment, at);
+    if (old < end) {
+      text.replace(old + 1, text.find('\n', old) - old - 1, assignment + std::string(value));
+    } else {
+      text.insert(at, "\n" + assignment + std::string(value) + "\n");
+    }
+    return text;
+  }
+
+  /// The error that reading a text ends with, the fixture's folder left out; empty when it is valid.
+  std::string failureOf(const std::string& text) {
+    RunLog log;
+    const std::string refusal = refusalOf([&] { readSetup(folder_ / "setup.kdx", text, log); });
+    return refusal == "accepted" ? "" : withoutFolder(refusal);
   }
 
   RunConfig read(std::string_view edits = {}) {
@@ -51,15 +83,12 @@ class SetupFixture : public testing::Test {
   }
 
   /// The error that reading ends with as refusalOf() tells it, the fixture's folder left out; empty when it is valid.
-  std::string failure(std::string_view edits) {
-    const std::string refusal = refusalOf([&] { read(edits); });
-    return refusal == "accepted" ? "" : withoutFolder(refusal);
-  }
+  std::string failure(std::string_view edits) { return failureOf(edited(edits)); }
 
   std::string withoutFolder(std::string text) const {
     const std::string prefix = folder_.path() + "/";
-    for (auto place = text.find(prefix); place != std::string::npos; place = text.find(prefix, place)) {
-      text.erase(place, prefix.size());
+    for (auto location = text.find(prefix); location != std::string::npos; location = text.find(prefix, location)) {
+      text.erase(location, prefix.size());
     }
     return text;
   }

@@ -13,8 +13,6 @@ namespace mirevo {
 namespace {
 
 constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
-constexpr std::int32_t kCentral = 1;
-constexpr std::int32_t kOfValue = 1;
 
 /// How far a parameter may and should move, on the search scale.
 struct Step {
@@ -34,7 +32,7 @@ Step wantedStep(const SensitivitySettings& settings, const SearchSpace& space, s
   Step step;
   step.roomUp = std::max(upper - base[j], 0.0);
   step.roomDown = std::max(base[j] - space.lower[j], 0.0);
-  if (settings.perturbationOption != kOfValue) {
+  if (settings.perturbationOption == PerturbationOption::range) {
     step.extent = upper - space.lower[j];
     step.up = step.down = fraction * step.extent;
   } else if (type == TransformationType::logarithmic) {
@@ -144,13 +142,45 @@ void appendTable(std::vector<std::string>& lines, const std::string& title, std:
 
 }  // namespace
 
+const SettingSection<SensitivitySettings>& localSensitivitySection() {
+  using Settings = SensitivitySettings;
+  static const SettingSection<SensitivitySettings> section{
+      {"SENSITIVITY_ANALYSIS/LOCAL_SA",
+       "when `Sensitivity_Type` is 0",
+       "Local sensitivity analysis by differences around the initial values.",
+       {setting<&Settings::differencing>({.name = "Differencing",
+                                          .defaultValue = "0",
+                                          .range = between(0, 1),
+                                          .codes = kDifferencingNames,
+                                          .refusal = "Error: Differencing option in local sensitivity analysis invalid",
+                                          .meaning = "Kind of differences."}),
+        setting<&Settings::perturbationOption>(
+            {.name = "Perturbation_Option",
+             .defaultValue = "0",
+             .range = between(0, 1),
+             .codes = kPerturbationOptionNames,
+             .refusal = "Error: Perturbation option in local sensitivity analysis invalid",
+             .meaning = "The perturbation is a fraction of the parameter's range, or of its value."}),
+        setting<&Settings::perturbationFraction>(
+            {.name = "Perturbation_Fraction",
+             .defaultValue = "0.01",
+             .range = {.lowest = 0, .highest = 1, .lowestExcluded = true},
+             .refusal = "Error: Perturbation fraction in local sensitivity analysis invalid",
+             .meaning = "That fraction."}),
+        setting<&Settings::calculatesCovariance>(
+            {.name = "Calculate_Covmatrix",
+             .defaultValue = "0",
+             .meaning = "1: also compute the covariance and correlation matrix of the parameters."})}}};
+  return section;
+}
+
 PerturbationPlan planPerturbations(const SensitivitySettings& settings, const SearchSpace& space,
                                    std::span<const double> base) {
   PerturbationPlan plan;
   plan.sets.emplace_back(base.begin(), base.end());
   for (std::size_t j = 0; j < space.size(); ++j) {
     const Step step = wantedStep(settings, space, base, j);
-    plan.differences.push_back(planDifference(step, settings.differencing == kCentral, j, plan.sets));
+    plan.differences.push_back(planDifference(step, settings.differencing == Differencing::central, j, plan.sets));
   }
   return plan;
 }

@@ -6,13 +6,28 @@
 #include <string>
 #include <vector>
 
-#include "algorithms/analyses/analysis_settings.h"
 #include "algorithms/analyses/covariance.h"
 #include "algorithms/analyses/uncertainty.h"
+#include "common/settings/keyword_row.h"
 #include "evaluation/evaluator.h"
 #include "parameters/search_space.h"
 
 namespace mirevo {
+
+enum class Differencing : std::int32_t { forward = 0, central = 1 };
+inline constexpr CodeName kDifferencingNames[] = {{0, "forward"}, {1, "central"}};
+/// What the perturbation is a fraction of.
+enum class PerturbationOption : std::int32_t { range = 0, value = 1 };
+inline constexpr CodeName kPerturbationOptionNames[] = {{0, "range"}, {1, "value"}};
+
+struct SensitivitySettings {
+  Differencing differencing = Differencing::forward;
+  PerturbationOption perturbationOption = PerturbationOption::range;
+  double perturbationFraction = 0.01;
+  bool calculatesCovariance = false;
+};
+/// The section LOCAL_SA.
+const SettingSection<SensitivitySettings>& localSensitivitySection();
 
 /// The two sets whose difference gives the derivatives by one parameter.
 struct ParameterDifference {

@@ -4,9 +4,21 @@
 #include <cmath>
 #include <limits>
 
+#include <fmt/format.h>
+
 #include "algorithms/numbers/sample_summary.h"
+#include "common/calendar.h"
+#include "common/text.h"
 
 namespace mirevo {
+namespace {
+
+/// With the digits of a series' 32-bit values.
+std::string cell(double value) {
+  return std::isfinite(value) ? fmt::format("{}", static_cast<float>(value)) : "NaN";
+}
+
+}  // namespace
 
 SeriesBand seriesBand(std::span<const double> observed, std::span<const EvaluationResult> results, std::size_t first) {
   SeriesBand band;
@@ -31,6 +43,18 @@ SeriesBand seriesBand(std::span<const double> observed, std::span<const Evaluati
                          ? std::numeric_limits<double>::quiet_NaN()
                          : static_cast<double>(inside) / static_cast<double>(band.observationCount);
   return band;
+}
+
+std::string seriesBandText(std::string_view title, const ObservedSeries& observed, const SeriesBand& band) {
+  constexpr double kSecondsPerDay = 86400.0;
+  std::string text = fmt::format("# Band of {}\ntime,observed,5 %,50 %,95 %\n", columnName(title));
+  const std::int64_t origin = secondNumber(observed.start);
+  for (std::size_t t = 0; t < observed.days.size(); ++t) {
+    const DateRecord time = dateOfSecond(origin + std::llround(observed.days[t] * kSecondsPerDay));
+    text += fmt::format("{},{},{},{},{}\n", formatDate(time), cell(observed.values[t]), cell(band.lower[t]),
+                        cell(band.median[t]), cell(band.upper[t]));
+  }
+  return text;
 }
 
 }  // namespace mirevo

@@ -2,9 +2,12 @@
 
 #include <cstddef>
 #include <span>
+#include <string>
+#include <string_view>
 #include <vector>
 
 #include "evaluation/evaluation_result.h"
+#include "measures/observed_series.h"
 
 namespace mirevo {
 
@@ -20,5 +23,8 @@ struct SeriesBand {
 /// The band over the evaluations that succeeded, of the series whose simulated values begin at `first` in theirs;
 /// `observed` holds its observations. Values that are not finite are left out.
 SeriesBand seriesBand(std::span<const double> observed, std::span<const EvaluationResult> results, std::size_t first);
+
+/// The band as a time-series file: the columns time, observed, 5 %, 50 % and 95 %, one row per observation.
+std::string seriesBandText(std::string_view title, const ObservedSeries& observed, const SeriesBand& band);
 
 }  // namespace mirevo

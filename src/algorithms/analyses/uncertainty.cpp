@@ -11,8 +11,6 @@ namespace mirevo {
 
 namespace {
 
-constexpr std::int32_t kLatinHypercube = 1;
-
 /// Moves deviate i into stratum (pi_i - 1, pi_i) / N, pi_i being its rank among the deviates, from 1, equal ones by
 /// index.
 void stratify(std::vector<double>& deviates, UniformGenerator& random) {
@@ -55,6 +53,46 @@ void appendSummaries(std::vector<std::string>& lines, const std::string& title, 
 
 }  // namespace
 
+const SettingSection<UncertaintySection>& uncertaintySection() {
+  static const SettingSection<UncertaintySection> section{
+      {"UNCERTAINTY_ESTIMATION",
+       "when `Option` is 3",
+       "Uncertainty analysis by sampling.",
+       {setting<UncertaintySection>([](auto& s) -> auto& { return s.settings.samplingType; },
+                                    {.name = "Uncertainty_Type",
+                                     .range = between(0, 1),
+                                     .codes = kSamplingTypeNames,
+                                     .refusal = "Error: Invalid uncertainty estimation type selection",
+                                     .meaning = "How the parameter sets are drawn."}),
+        setting<UncertaintySection>([](auto& s) -> auto& { return s.settings.sampleSize; },
+                                    {.name = "Sample_Size",
+                                     .range = from(2),
+                                     .refusal = "Error: Sample size in uncertainty estimation invalid",
+                                     .unit = "model runs",
+                                     .meaning = "Parameter sets that are drawn."}),
+        setting<UncertaintySection>(
+            [](auto& s) -> auto& { return s.randomSeed; },
+            {.name = "Random_Seed", .defaultValue = "1", .meaning = "Seed of the run; its sign does not matter."})}}};
+  return section;
+}
+
+const SettingSection<NormalDistribution>& distributionSection() {
+  static const SettingSection<NormalDistribution> section{
+      {"UNCERTAINTY_ESTIMATION/PARAMETER_n",
+       "for each variable parameter",
+       "The normal distribution of the n-th *variable* parameter, counted in the order of `MODEL_PARAMETERS`.",
+       {setting<&NormalDistribution::mean>({.name = "Mean_Value",
+                                            .unit = "search scale",
+                                            .meaning = "Mean; that of the logarithm for a logarithmic parameter."}),
+        setting<&NormalDistribution::standardDeviation>(
+            {.name = "Standard_Deviation",
+             .range = kPositive,
+             .refusal = "Error: Standard deviation in uncertainty estimation invalid",
+             .unit = "search scale",
+             .meaning = "Standard deviation."})}}};
+  return section;
+}
+
 std::vector<ParameterSet> uncertaintySample(const UncertaintySettings& settings, std::int32_t seed,
                                             const MessageSink& messages) {
   UniformGenerator random(seed);
@@ -63,7 +101,7 @@ std::vector<ParameterSet> uncertaintySample(const UncertaintySettings& settings,
   std::vector<double> deviates(n);
   for (std::size_t j = 0; j < settings.parameters.size(); ++j) {
     for (double& deviate : deviates) deviate = random.next();
-    if (settings.uncertaintyType == kLatinHypercube) stratify(deviates, random);
+    if (settings.samplingType == SamplingType::latinHypercube) stratify(deviates, random);
     const NormalDistribution& distribution = settings.parameters[j];
     for (std::size_t i = 0; i < n; ++i) {
       int fault = 0;

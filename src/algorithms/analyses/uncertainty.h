@@ -5,13 +5,37 @@
 #include <string>
 #include <vector>
 
-#include "algorithms/analyses/analysis_settings.h"
 #include "algorithms/numbers/sample_summary.h"
 #include "algorithms/numbers/special_functions.h"
 #include "common/parameter_set.h"
+#include "common/settings/keyword_row.h"
 #include "evaluation/evaluator.h"
 
 namespace mirevo {
+
+/// The distribution of one variable parameter, on the search scale: of a logarithmic parameter that of its logarithm.
+struct NormalDistribution {
+  double mean = 0.0;
+  double standardDeviation = 0.0;
+};
+
+enum class SamplingType : std::int32_t { simpleRandom = 0, latinHypercube = 1 };
+inline constexpr CodeName kSamplingTypeNames[] = {{0, "simple random"}, {1, "Latin hypercube"}};
+
+struct UncertaintySettings {
+  SamplingType samplingType = SamplingType::simpleRandom;
+  std::int32_t sampleSize = 0;                 ///< N, at least 2
+  std::vector<NormalDistribution> parameters;  ///< one per variable parameter, in setup order
+};
+
+/// The section UNCERTAINTY_ESTIMATION, and the seed of the run that it shares with the initial sample.
+struct UncertaintySection {
+  UncertaintySettings& settings;
+  std::int32_t& randomSeed;
+};
+const SettingSection<UncertaintySection>& uncertaintySection();
+/// Its sections PARAMETER_n.
+const SettingSection<NormalDistribution>& distributionSection();
 
 /// N sets drawn from independent normal distributions, not held against the bounds. The stream starts anew from the
 /// seed, whose sign does not matter. A deviate that has no quantile is reported to `messages` and yields the mean.

@@ -4,6 +4,8 @@
 #include <cmath>
 #include <utility>
 
+#include <fmt/format.h>
+
 namespace mirevo {
 
 namespace {
@@ -152,6 +154,73 @@ ParameterSet ddsCandidate(std::span<const double> best, const SearchBounds& boun
     candidate[j] = ddsReflect(perturbed, bounds.lower[j], bounds.upper[j]);
   }
   return candidate;
+}
+
+const SearchFacts& DdsMethod::facts() const {
+  static constexpr SearchFacts kFacts{.name = {2, "DDS"}, .longName = "Dynamically Dimensioned Search"};
+  return kFacts;
+}
+
+BoundSection DdsMethod::section() {
+  static const SettingSection<DdsMethod> section{
+      {"OPTIMISATION_ALGORITHM/DDS_CONTROL_PARAMETERS",
+       "when `Algorithm_Type` is 2",
+       "Dynamically Dimensioned Search.",
+       {setting<DdsMethod>(
+           [](auto& m) -> auto& { return m.settings.perturbation; },
+           {.name = "Perturbation_Parameter",
+            .defaultValue = "0.2",
+            .range = kFraction,
+            .refusal = "Error: Perturbation parameter in DDS algorithm invalid",
+            .meaning = "Neighbourhood size r: standard deviation of a perturbation as a fraction of the "
+                       "parameter's range."})}}};
+  return {section, *this};
+}
+
+std::vector<SearchAdvice> DdsMethod::advice(std::size_t /*n*/) const {
+  return {};
+}
+
+std::string_view DdsMethod::budgetRefusal() const {
+  return "Error: Maximum No. of model evaluations in DDS algorithm invalid";
+}
+
+RaisedBudget DdsMethod::raiseBudget(const SearchHistory& history, const StoppingCriteria& stopping,
+                                    const InitialSampleSettings& sample) const {
+  RaisedBudget raised;
+  const bool isFirst = history.searches.empty();
+  const int before = isFirst ? 0 : history.searches.back().lastEvaluation;
+  if (history.evaluations <= before) return raised;  // it had not begun
+  const int startPoints = isFirst && evaluatesSample(sample) ? ddsStartPointCount(history.budget) : 1;
+  const int last = std::min(history.budget, std::max(history.evaluations, before + startPoints));
+  raised.earlier = EarlierSearch{history.budget, last};
+  raised.note = fmt::format(
+      "Max_No_Evaluations was raised from {} to {}: as the probabilities of Dynamically Dimensioned Search depend on "
+      "it, "
+      "a new search starts from the best of the first {} evaluations, which are kept",
+      history.budget, stopping.maxEvaluations, last);
+  return raised;
+}
+
+std::unique_ptr<SearchAlgorithm> DdsMethod::make(SearchProblem problem) const {
+  const bool continues = !problem.earlierSearches.empty();
+  const int made = continues ? problem.earlierSearches.back().lastEvaluation : 0;
+  return std::make_unique<Dds>(settings, problem.stopping.maxEvaluations - made,
+                               continues || problem.initialSample.includeInitialParameters, std::move(problem.bounds),
+                               problem.evaluator, problem.random);
+}
+
+SearchSummary DdsMethod::run(SearchProblem problem, const PeriodicStep& /*periodicStep*/) const {
+  bool startsFromInitial = problem.initialSample.includeInitialParameters;
+  int made = 0;
+  for (const EarlierSearch& earlier : problem.earlierSearches) {
+    Dds search(settings, earlier.maxEvaluations - made, startsFromInitial, problem.bounds, problem.evaluator,
+               problem.random);
+    problem.bounds.initial = runSearch(search, facts().name.name, {}, earlier.lastEvaluation - made).best;
+    startsFromInitial = true;
+    made = earlier.lastEvaluation;
+  }
+  return SearchMethod::run(std::move(problem), {});
 }
 
 }  // namespace mirevo

@@ -5,10 +5,14 @@
 
 #include "algorithms/numbers/uniform_generator.h"
 #include "algorithms/searches/search_algorithm.h"
-#include "algorithms/searches/search_settings.h"
+#include "algorithms/searches/search_method.h"
 #include "evaluation/evaluator.h"
 
 namespace mirevo {
+
+struct DdsSettings {
+  double perturbation = 0.2;  ///< neighbourhood size r, as a fraction of a parameter's range
+};
 
 /// Dynamically Dimensioned Search after Tolson and Shoemaker (2007), doi:10.1029/2005WR004723. One candidate at a time:
 /// the best set with some parameters perturbed, ever fewer of them as the budget is used up.
@@ -67,5 +71,26 @@ double ddsReflect(double value, double lower, double upper);
 /// perturbation's standard deviation as a fraction of the parameter's range.
 ParameterSet ddsCandidate(std::span<const double> best, const SearchBounds& bounds, double r,
                           double inclusionProbability, const DeviateSource& deviate);
+
+/// DDS as setups choose it.
+class DdsMethod final : public SearchMethod {
+ public:
+  const SearchFacts& facts() const override;
+  BoundSection section() override;
+  std::vector<SearchAdvice> advice(std::size_t n) const override;
+  std::string_view budgetRefusal() const override;
+  /// Random start points, unless it starts from the initial set.
+  bool evaluatesSample(const InitialSampleSettings& sample) const override { return !sample.includeInitialParameters; }
+  /// It perturbs ever fewer parameters as its budget is used up, so that another budget is another search: that starts
+  /// from the best parameter set of the earlier one, whose evaluations are kept.
+  RaisedBudget raiseBudget(const SearchHistory& history, const StoppingCriteria& stopping,
+                           const InitialSampleSettings& sample) const override;
+  /// The last of the searches that run() makes, with what its predecessors have left of the budget.
+  std::unique_ptr<SearchAlgorithm> make(SearchProblem problem) const override;
+  /// Runs the earlier searches with smaller budgets first, each from the best set of the one before.
+  SearchSummary run(SearchProblem problem, const PeriodicStep& periodicStep) const override;
+
+  DdsSettings settings;
+};
 
 }  // namespace mirevo

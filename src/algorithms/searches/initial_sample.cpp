@@ -152,6 +152,44 @@ ParameterSet readRow(const std::vector<std::string_view>& cells, const std::vect
 
 }  // namespace
 
+const SettingSection<InitialSampleSection>& initialSampleSection() {
+  static constexpr CodeName kNames[] = {{0, "uniform random"},
+                                        {1, "Latin hypercube"},
+                                        {2, "scrambled Sobol"},
+                                        {3, "maximin Latin hypercube"},
+                                        {4, "from file"}};
+  static const SettingSection<InitialSampleSection> section{
+      {"OPTIMISATION_ALGORITHM/INITIAL_SAMPLE",
+       "when `Option` is 2",
+       "Where the search starts.",
+       {setting<InitialSampleSection>(
+            [](auto& s) -> auto& { return s.sample.includeInitialParameters; },
+            {.name = "Include_Initial_Parameters",
+             .defaultValue = "1",
+             .meaning = "1: the initial values are the first set of the sample; DDS then starts from them alone. 0: "
+                        "they are not."}),
+        setting<InitialSampleSection>(
+            [](auto& s) -> auto& { return s.randomSeed; },
+            {.name = "Random_Seed",
+             .defaultValue = "1",
+             .meaning = "Seed of the run; the same seed gives the same results. The same setting as the uncertainty "
+                        "analysis's."}),
+        setting<InitialSampleSection>([](auto& s) -> auto& { return s.sample.generation; },
+                                      {.name = "Initial_Sample_Generation",
+                                       .defaultValue = "1",
+                                       .range = between(0, 4),
+                                       .codes = kNames,
+                                       .refusal = "Error: Initial sample generation method invalid",
+                                       .meaning = "How the sample is drawn: 2 is a Sobol sequence, 3 a Latin hypercube "
+                                                  "with maximin distance, 4 is read from the file."}),
+        setting<InitialSampleSection>([](auto& s) -> auto& { return s.sample.fileName; },
+                                      {.name = kInitialSampleFileKeyword,
+                                       .type = KeywordType::fileName,
+                                       .defaultValue = "''",
+                                       .meaning = "The file of generation 4."})}}};
+  return section;
+}
+
 SearchBounds searchBounds(const SearchSpace& space) {
   // Ten times the tolerance by which the integer rule lifts a value onto the next integer.
   constexpr double kBelowNextInteger = 1.0e-7;
@@ -170,8 +208,7 @@ std::vector<ParameterSet> drawInitialSample(const InitialSampleSettings& setting
   sample.reserve(count);
   if (settings.includeInitialParameters && count > 0) sample.push_back(bounds.initial);
   const std::size_t drawn = count - sample.size();
-  const auto generation = static_cast<SampleGeneration>(settings.generation);
-  if (generation == SampleGeneration::fromFile) {
+  if (settings.generation == SampleGeneration::fromFile) {
     if (givenSets.size() < drawn) {
       fatalError(kInvalidFile,
                  fmt::format("{}: found {} sets, expected at least {}", settings.fileName, givenSets.size(), drawn));
@@ -179,7 +216,7 @@ std::vector<ParameterSet> drawInitialSample(const InitialSampleSettings& setting
     sample.insert(sample.end(), givenSets.begin(), givenSets.begin() + static_cast<std::ptrdiff_t>(drawn));
     return sample;
   }
-  for (const auto& point : drawUnitPoints(generation, drawn, bounds.size(), random)) {
+  for (const auto& point : drawUnitPoints(settings.generation, drawn, bounds.size(), random)) {
     sample.push_back(withinBounds(point, bounds));
   }
   return sample;

@@ -1,16 +1,10 @@
 #include "algorithms/searches/optimisation_driver.h"
 
-#include <memory>
 #include <new>
-#include <optional>
 #include <stdexcept>
-#include <utility>
 
 #include <fmt/format.h>
 
-#include "algorithms/searches/pse.h"
-#include "algorithms/searches/sce.h"
-#include "algorithms/surrogate/proposal_selector.h"
 #include "common/fatal_error.h"
 #include "common/text.h"
 
@@ -56,18 +50,6 @@ SearchSummary runSearch(SearchAlgorithm& search, std::string_view algorithm, con
   } catch (const std::length_error&) {  // a container asked for more than there can be
     failForMemory();
   }
-}
-
-SearchSummary runPopulationSearch(const PopulationSearchSettings& settings, SearchProblem problem,
-                                  const PeriodicStep& periodicStep) {
-  std::optional<ProposalSelector> selector;
-  problem.selector = settings.usesSurrogate ? &selector.emplace(settings.surrogate, problem.bounds) : nullptr;
-  if (settings.algorithm == PopulationAlgorithm::sce) {
-    Sce search(settings.sce, settings.simplex, std::move(problem));
-    return runSearch(search, "SCE", periodicStep);
-  }
-  Pse search(settings.pse, settings.simplex, std::move(problem));
-  return runSearch(search, "PSE", periodicStep);
 }
 
 }  // namespace mirevo

@@ -5,10 +5,7 @@
 #include <string>
 #include <string_view>
 
-#include "algorithms/searches/population_search.h"
 #include "algorithms/searches/search_algorithm.h"
-#include "algorithms/searches/search_settings.h"
-#include "algorithms/surrogate/proposal_selector.h"
 
 namespace mirevo {
 
@@ -21,21 +18,5 @@ using PeriodicStep = std::function<void(std::string_view line)>;
 /// With `evaluationLimit` it ends as soon as so many evaluations are made, though the search itself would go on.
 SearchSummary runSearch(SearchAlgorithm& search, std::string_view algorithm, const PeriodicStep& periodicStep,
                         int evaluationLimit = std::numeric_limits<int>::max());
-
-enum class PopulationAlgorithm { sce, pse };
-
-struct PopulationSearchSettings {
-  PopulationAlgorithm algorithm = PopulationAlgorithm::sce;
-  bool usesSurrogate = false;
-  SceSettings sce;
-  PseSettings pse;
-  SimplexSettings simplex;
-  SurrogateSettings surrogate;  ///< with usesSurrogate
-};
-
-/// Runs SCE or PSE, with or without the help of the surrogate model, from its initial sample to its end. Throws what
-/// runSearch() throws. The `selector` of `problem` is set here.
-SearchSummary runPopulationSearch(const PopulationSearchSettings& settings, SearchProblem problem,
-                                  const PeriodicStep& periodicStep);
 
 }  // namespace mirevo

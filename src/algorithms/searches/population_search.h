@@ -5,28 +5,14 @@
 #include <span>
 #include <vector>
 
-#include "algorithms/numbers/uniform_generator.h"
 #include "algorithms/searches/population.h"
 #include "algorithms/searches/search_algorithm.h"
-#include "algorithms/searches/search_settings.h"
+#include "algorithms/searches/search_problem.h"
 #include "algorithms/searches/stopping_criteria.h"
-#include "evaluation/evaluator.h"
 
 namespace mirevo {
 
-class ProposalSelector;
 struct PredictedMinimum;
-
-/// What a population search works on. The references must outlive the search.
-struct SearchProblem {
-  SearchBounds bounds;
-  StoppingCriteria stopping;
-  InitialSampleSettings initialSample;
-  std::vector<ParameterSet> givenSample;  ///< search scale; the sets of the initial sample file, for generation 4
-  Evaluator& evaluator;
-  UniformGenerator& random;
-  ProposalSelector* selector = nullptr;  ///< of a surrogate-assisted search
-};
 
 /// Statuses of a search step.
 inline constexpr SearchStatus kSearchSettingsInvalid = 1;

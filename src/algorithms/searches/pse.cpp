@@ -4,6 +4,8 @@
 #include <cmath>
 #include <utility>
 
+#include <fmt/format.h>
+
 #include "algorithms/numbers/special_functions.h"
 #include "algorithms/surrogate/proposal_selector.h"
 
@@ -20,6 +22,19 @@ constexpr double kReflectionLength = 1.1;
 
 /// With a surrogate model: of a generation one run in so many goes to its predicted minima.
 constexpr std::size_t kPointsPerMinimum = 4;
+
+constexpr std::string_view kPopulationKeyword = "Population_Size";
+constexpr std::string_view kSimplexKeyword = "No_Points_Simplex";
+constexpr std::string_view kContractionKeyword = "Prob_Contraction";
+constexpr std::string_view kSimplexRefusal = "Error: No. of points in a simplex in PSE algorithm invalid";
+
+std::optional<SettingRefusal> validateProbabilities(const PseSettings& settings) {
+  if (settings.reflectionProbability + settings.contractionProbability <= 1.0) return std::nullopt;
+  return SettingRefusal{"Error: Sum of probabilities for reflection and contraction in PSE algorithm larger than 1",
+                        kContractionKeyword,
+                        fmt::format("expected at most 1 with Prob_Reflection, found {} + {}",
+                                    settings.reflectionProbability, settings.contractionProbability)};
+}
 
 constexpr int kReflectionFailed = 1;
 constexpr int kContractionFailed = 2;
@@ -152,6 +167,72 @@ ParameterSet Pse::mutation(std::size_t parent, std::span<const std::size_t> othe
     if (isOutside) point[j] = box.lower[j] + draw() * (box.upper[j] - box.lower[j]);
   }
   return clampedToBounds(std::move(point));
+}
+
+const SearchFacts& PseMethod::facts() const {
+  static constexpr SearchFacts kFacts{.name = {1, "PSE"},
+                                      .longName = "Population Simplex Evolution",
+                                      .runsInParallel = true,
+                                      .usesSurrogate = true,
+                                      .drawsInitialSample = true};
+  return kFacts;
+}
+
+BoundSection PseMethod::section() {
+  static const SettingSection<PseMethod> section{
+      {"OPTIMISATION_ALGORITHM/PSE_CONTROL_PARAMETERS",
+       "when `Algorithm_Type` is 1",
+       "Population Simplex Evolution.",
+       {setting<PseMethod>([](auto& m) -> auto& { return m.settings.populationSize; },
+                           {.name = kPopulationKeyword,
+                            .range = from(1),
+                            .refusal = "Error: Population size in PSE algorithm invalid",
+                            .meaning = "Points of the population and model runs of a generation."}),
+        checked<PseMethod>(setting<PseMethod>([](auto& m) -> auto& { return m.simplex.pointCount; },
+                                              {.name = kSimplexKeyword,
+                                               .range = from(2),
+                                               .refusal = kSimplexRefusal,
+                                               .meaning = "Points in a simplex, at most those of the population. The "
+                                                          "same setting as SCE's `No_Points_Subcomplex`."}),
+                           [](const PseMethod& m) { return validatePseControl(m); }),
+        setting<PseMethod>([](auto& m) -> auto& { return m.settings.reflectionProbability; },
+                           {.name = "Prob_Reflection",
+                            .defaultValue = "0.7",
+                            .range = kFraction,
+                            .refusal = "Error: Probability for reflection step in PSE algorithm invalid",
+                            .meaning = "Probability of the move that is due: a reflection, after it a contraction."}),
+        checked<PseMethod>(
+            setting<PseMethod>([](auto& m) -> auto& { return m.settings.contractionProbability; },
+                               {.name = kContractionKeyword,
+                                .defaultValue = "0",
+                                .range = kFraction,
+                                .refusal = "Error: Probability for contraction step in PSE algorithm invalid",
+                                .meaning = "Probability of an immediate contraction; the remainder to 1 is the "
+                                           "probability of an immediate mutation."}),
+            [](const PseMethod& m) { return validateProbabilities(m.settings); })}}};
+  return {section, *this};
+}
+
+std::optional<SettingRefusal> validatePseControl(const PseMethod& method) {
+  const std::int32_t points = method.settings.populationSize;
+  if (method.simplex.pointCount <= points) return std::nullopt;
+  return SettingRefusal{
+      std::string(kSimplexRefusal), kSimplexKeyword,
+      fmt::format("expected at most the {} points of the population, found {}", points, method.simplex.pointCount)};
+}
+
+std::vector<SearchAdvice> PseMethod::advice(std::size_t n) const {
+  const auto count = static_cast<std::int64_t>(n);
+  return {{kPopulationKeyword, settings.populationSize, 4 * (2 * count + 1)},
+          {kSimplexKeyword, simplex.pointCount, count + 1}};
+}
+
+double PseMethod::loopsBefore(double sets) const {
+  return std::ceil(sets / static_cast<double>(settings.populationSize)) - 1.0;
+}
+
+std::unique_ptr<SearchAlgorithm> PseMethod::make(SearchProblem problem) const {
+  return std::make_unique<Pse>(settings, simplex, std::move(problem));
 }
 
 }  // namespace mirevo

@@ -4,9 +4,16 @@
 #include <span>
 #include <vector>
 
+#include "algorithms/searches/population_method.h"
 #include "algorithms/searches/population_search.h"
 
 namespace mirevo {
+
+struct PseSettings {
+  std::int32_t populationSize = 50;
+  double reflectionProbability = 0.7;   ///< of the move that is due, at first a reflection
+  double contractionProbability = 0.0;  ///< of a contraction at once; what is left to 1 is that of a mutation at once
+};
 
 /// Population Simplex Evolution: the step of SCE made by all points of one population at once, a whole generation in
 /// one batch.
@@ -21,10 +28,10 @@ namespace mirevo {
 /// A mutation that is due is made; else the move that is due with `reflectionProbability`, a contraction at once with
 /// `contractionProbability`, and a mutation at once with what is left to 1. It takes the place of u when better. A new
 /// point begins a step. A mutation is normally distributed about g, in every parameter on its own: that brings back the
-/// directions that the linear moves lose. It also stands in for a reflection outside the bounds. a and c are those of
-/// SCE. With a surrogate model the most promising of several offspring of a point is run; a quarter of the generation
-/// is run where the model predicts least around each of the best points. What the alternatives cost is measured in
-/// docs/algorithms/pse.md and docs/algorithms/surrogate.md.
+/// directions that the linear moves lose. It also stands in for a reflection outside the bounds. c is that of SCE,
+/// a is 1.1 times that of SCE. With a surrogate model the most promising of several offspring of a point is run; a
+/// quarter of the generation is run where the model predicts least around each of the best points. What the
+/// alternatives cost is measured in docs/algorithms/pse.md and docs/algorithms/surrogate.md.
 class Pse final : public PopulationSearch {
  public:
   Pse(const PseSettings& settings, const SimplexSettings& simplex, SearchProblem problem);
@@ -53,5 +60,23 @@ class Pse final : public PopulationSearch {
   PseSettings settings_;
   SimplexSettings simplex_;
 };
+
+/// PSE as setups choose it.
+class PseMethod final : public PopulationMethod {
+ public:
+  const SearchFacts& facts() const override;
+  BoundSection section() override;
+  std::vector<SearchAdvice> advice(std::size_t n) const override;
+  std::int64_t populationSize() const override { return settings.populationSize; }
+  double evaluationsPerLoop() const override { return settings.populationSize; }
+  /// It asks the surrogate model once per generation, SCE at every step.
+  double loopsBefore(double sets) const override;
+  std::unique_ptr<SearchAlgorithm> make(SearchProblem problem) const override;
+
+  PseSettings settings;
+};
+
+/// That a simplex has no more points than the population.
+std::optional<SettingRefusal> validatePseControl(const PseMethod& method);
 
 }  // namespace mirevo

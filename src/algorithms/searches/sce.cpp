@@ -3,9 +3,18 @@
 #include <algorithm>
 #include <utility>
 
+#include <fmt/format.h>
+
 #include "algorithms/surrogate/proposal_selector.h"
 
 namespace mirevo {
+namespace {
+
+constexpr std::string_view kPointsKeyword = "No_Points_Complex";
+constexpr std::string_view kSubcomplexKeyword = "No_Points_Subcomplex";
+constexpr std::string_view kSubcomplexRefusal = "Error: No. of points in a subcomplex in SCE algorithm invalid";
+
+}  // namespace
 
 Sce::Sce(const SceSettings& settings, const SimplexSettings& simplex, SearchProblem problem)
     : PopulationSearch(std::move(problem)), settings_(settings), simplex_(simplex) {}
@@ -130,6 +139,68 @@ ParameterSet Sce::mutation(const Complex& complex) {
   std::vector<ParameterSet> drawn;
   for (std::size_t i = 0; i < proposalsPerRun(); ++i) drawn.push_back(drawFrom(box));
   return drawn[mostPromising(drawn, 1).front()];
+}
+
+const SearchFacts& SceMethod::facts() const {
+  static constexpr SearchFacts kFacts{
+      .name = {0, "SCE"}, .longName = "Shuffled Complex Evolution", .usesSurrogate = true, .drawsInitialSample = true};
+  return kFacts;
+}
+
+BoundSection SceMethod::section() {
+  static const SettingSection<SceMethod> section{
+      {"OPTIMISATION_ALGORITHM/SCE_CONTROL_PARAMETERS",
+       "when `Algorithm_Type` is 0",
+       "Shuffled Complex Evolution.",
+       {setting<SceMethod>([](auto& m) -> auto& { return m.settings.complexCount; },
+                           {.name = "No_Complexes",
+                            .range = from(1),
+                            .refusal = "Error: No. of complexes in SCE algorithm invalid",
+                            .meaning = "Complexes, p."}),
+        setting<SceMethod>([](auto& m) -> auto& { return m.settings.pointsPerComplex; },
+                           {.name = kPointsKeyword,
+                            .range = from(2),
+                            .refusal = "Error: No. of points in a complex in SCE algorithm invalid",
+                            .meaning = "Points in a complex, m; 2n + 1 for n variable parameters is usual."}),
+        checked<SceMethod>(
+            setting<SceMethod>([](auto& m) -> auto& { return m.simplex.pointCount; },
+                               {.name = kSubcomplexKeyword,
+                                .range = from(2),
+                                .refusal = kSubcomplexRefusal,
+                                .meaning = "Points in a subcomplex, q, at most those of a complex; n + 1 is usual."}),
+            [](const SceMethod& m) { return validateSceControl(m); }),
+        setting<SceMethod>([](auto& m) -> auto& { return m.settings.evolutionSteps; },
+                           {.name = "No_Evaluation_Steps",
+                            .range = from(1),
+                            .refusal = "Error: No. of evaluation steps in SCE algorithm invalid",
+                            .meaning = "Evolution steps of a complex between two shuffles; 2n + 1 is usual."})}}};
+  return {section, *this};
+}
+
+std::optional<SettingRefusal> validateSceControl(const SceMethod& method) {
+  const std::int32_t points = method.settings.pointsPerComplex;
+  if (method.simplex.pointCount <= points) return std::nullopt;
+  return SettingRefusal{
+      std::string(kSubcomplexRefusal), kSubcomplexKeyword,
+      fmt::format("expected at most the {} points of a complex, found {}", points, method.simplex.pointCount)};
+}
+
+std::vector<SearchAdvice> SceMethod::advice(std::size_t n) const {
+  const auto count = static_cast<std::int64_t>(n);
+  return {{kPointsKeyword, settings.pointsPerComplex, 2 * count + 1},
+          {kSubcomplexKeyword, simplex.pointCount, count + 1}};
+}
+
+std::int64_t SceMethod::populationSize() const {
+  return std::int64_t{settings.complexCount} * settings.pointsPerComplex;
+}
+
+double SceMethod::evaluationsPerLoop() const {
+  return static_cast<double>(settings.complexCount) * settings.evolutionSteps;
+}
+
+std::unique_ptr<SearchAlgorithm> SceMethod::make(SearchProblem problem) const {
+  return std::make_unique<Sce>(settings, simplex, std::move(problem));
 }
 
 }  // namespace mirevo

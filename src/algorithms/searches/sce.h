@@ -2,9 +2,16 @@
 
 #include <vector>
 
+#include "algorithms/searches/population_method.h"
 #include "algorithms/searches/population_search.h"
 
 namespace mirevo {
+
+struct SceSettings {
+  std::int32_t complexCount = 2;
+  std::int32_t pointsPerComplex = 5;
+  std::int32_t evolutionSteps = 5;  ///< per complex and shuffling loop
+};
 
 /// Shuffled Complex Evolution after Duan, Sorooshian and Gupta (1992), doi:10.1029/91WR02985, and (1993),
 /// doi:10.1007/BF00939380.
@@ -68,5 +75,21 @@ class Sce final : public PopulationSearch {
   SimplexSettings simplex_;
   std::vector<Complex> complexes_;
 };
+
+/// SCE as setups choose it.
+class SceMethod final : public PopulationMethod {
+ public:
+  const SearchFacts& facts() const override;
+  BoundSection section() override;
+  std::vector<SearchAdvice> advice(std::size_t n) const override;
+  std::int64_t populationSize() const override;
+  double evaluationsPerLoop() const override;
+  std::unique_ptr<SearchAlgorithm> make(SearchProblem problem) const override;
+
+  SceSettings settings;
+};
+
+/// That a subcomplex has no more points than its complex.
+std::optional<SettingRefusal> validateSceControl(const SceMethod& method);
 
 }  // namespace mirevo

@@ -5,6 +5,32 @@
 
 namespace mirevo {
 
+const SettingSection<StoppingCriteria>& stoppingSection() {
+  static const SettingSection<StoppingCriteria> section{
+      {"OPTIMISATION_ALGORITHM/STOPPING_CRITERIA",
+       "when `Option` is 2",
+       "When the search stops; the first criterion that is met.",
+       {setting<&StoppingCriteria::maxEvaluations>({.name = kBudgetKeyword,
+                                                    .range = from(1),
+                                                    .refusal = "Error: Maximum No. of model evaluations invalid",
+                                                    .unit = "model runs",
+                                                    .meaning = "Budget of the search."}),
+        setting<&StoppingCriteria::loopsConvergence>(
+            {.name = "No_Loops_Convergence",
+             .defaultValue = "10",
+             .range = from(1),
+             .refusal = "Error: No. of loops for evaluation of convergence criterion invalid",
+             .unit = "loops",
+             .meaning = "Number of loops over which the change of the best objective value is evaluated."}),
+        setting<&StoppingCriteria::minChange>(
+            {.name = "Min_Change",
+             .defaultValue = "0.001",
+             .range = kNonNegative,
+             .refusal = "Error: Minimum change convergence criterion invalid",
+             .meaning = "Relative change of the best objective value below which the search has converged."})}}};
+  return section;
+}
+
 StoppingTests::StoppingTests(const StoppingCriteria& criteria)
     : criteria_(criteria), relativeChange_(criteria.minChange + criteria.minChange) {}
 

@@ -1,11 +1,24 @@
 #pragma once
 
+#include <cstdint>
 #include <deque>
 #include <string_view>
 
-#include "algorithms/searches/search_settings.h"
+#include "common/settings/keyword_row.h"
 
 namespace mirevo {
+
+/// When a search stops.
+struct StoppingCriteria {
+  std::int32_t maxEvaluations = 1000;
+  std::int32_t loopsConvergence = 10;  ///< loops over which the best objective value is compared
+  double minChange = 0.001;            ///< relative change of the best objective value below which it has converged
+};
+
+/// The keyword of `maxEvaluations`.
+inline constexpr std::string_view kBudgetKeyword = "Max_No_Evaluations";
+/// The section STOPPING_CRITERIA.
+const SettingSection<StoppingCriteria>& stoppingSection();
 
 /// The normalised population range below which a population has converged. Fixed, not a setting.
 inline constexpr double kConvergedPopulationRange = 1.0e-5;

@@ -6,6 +6,8 @@
 #include <numeric>
 #include <utility>
 
+#include <fmt/format.h>
+
 #include "algorithms/surrogate/gaussian_process.h"
 #include "algorithms/surrogate/pattern_search.h"
 #include "algorithms/surrogate/quadratic_surrogate.h"
@@ -25,32 +27,103 @@ constexpr std::size_t kMostNeighbours = 100;
 constexpr double kLikelyToFail = std::numeric_limits<double>::max();
 constexpr double kMadeAgain = std::numeric_limits<double>::infinity();
 
+constexpr CodeName kModelNames[] = {{0, "quadratic polynomial"}, {1, "Gaussian process"}};
+constexpr std::string_view kNeighbourhoodKeyword = "Neighbourhood_Size";
+constexpr std::string_view kGenerationsKeyword = "No_Initial_Generations";
+constexpr std::string_view kNeighbourhoodRefusal =
+    "Error: Invalid neighbourhood size for surrogate modelling optimisation";
+
 double squaredDistance(const std::vector<double>& a, const std::vector<double>& b) {
   double sum = 0.0;
   for (std::size_t j = 0; j < a.size(); ++j) sum += (a[j] - b[j]) * (a[j] - b[j]);
   return sum;
 }
 
-std::unique_ptr<SurrogateModel> makeModel(int type) {
-  if (type == 1) return std::make_unique<GaussianProcess>();
+std::unique_ptr<SurrogateModel> makeModel(SurrogateModelType type) {
+  if (type == SurrogateModelType::gaussianProcess) return std::make_unique<GaussianProcess>();
   return std::make_unique<QuadraticSurrogate>();
 }
 
 }  // namespace
 
+const SettingSection<SurrogateSettings>& surrogateSection() {
+  using Settings = SurrogateSettings;
+  static const SettingSection<SurrogateSettings> section{
+      {"OPTIMISATION_ALGORITHM/SURROGATE_MODEL_PARAMETERS",
+       "when `Use_Surrogate_Model` is 1",
+       "The surrogate model that SCE and PSE may use to save model runs. May be empty.",
+       {setting<&Settings::samplingRate>(
+            {.name = "Sampling_rate",
+             .defaultValue = "25",
+             .range = between(1, 100),
+             .refusal = "Error: Invalid sampling rate for surrogate modelling optimisation",
+             .unit = "per cent",
+             .meaning = "Share of the proposals that the model evaluates: those that the surrogate predicts best.",
+             .checkOrder = 2}),
+        setting<&Settings::neighbourhoodSize>(
+            {.name = kNeighbourhoodKeyword,
+             .defaultValue = "0",
+             .range = from(0),
+             .refusal = kNeighbourhoodRefusal,
+             .unit = "evaluated sets",
+             .meaning = "Nearest evaluated sets to which the surrogate is fitted; model type 0 needs (n+1)(n+2)/2 of "
+                        "them for n variable parameters. 0: one and a half times as many for model type 0, three times "
+                        "as many, but at most 100, for model type 1.",
+             .checkOrder = 1}),
+        setting<&Settings::modelType>(
+            {.name = "Model_Type",
+             .defaultValue = "1",
+             .range = between(0, 1),
+             .codes = kModelNames,
+             .refusal = "Error: Invalid model type for surrogate modelling optimisation",
+             .meaning =
+                 "Kind of surrogate: a full quadratic polynomial, or a Gaussian process, which takes fewer model "
+                 "runs and milliseconds of computation for each."}),
+        setting<&Settings::initialGenerations>(
+            {.name = kGenerationsKeyword,
+             .defaultValue = "1",
+             .range = from(1),
+             .refusal = "Error: Invalid no of initial generations for surrogate modelling optimisation",
+             .unit = "loops",
+             .meaning = "Number of initial loops without the surrogate; together with the initial sample they must "
+                        "provide at least `Neighbourhood_Size` evaluated sets, if that is given.",
+             .checkOrder = 3})}}};
+  return section;
+}
+
+std::optional<SettingRefusal> validateSurrogateControl(const SurrogateSettings& settings, std::size_t n,
+                                                       std::optional<double> available) {
+  const std::int32_t size = settings.neighbourhoodSize;
+  const std::size_t coefficients = quadraticCoefficientCount(n);
+  if (size > 0 && settings.modelType == SurrogateModelType::quadraticPolynomial &&
+      static_cast<std::size_t>(size) < coefficients) {
+    return SettingRefusal{
+        std::string(kNeighbourhoodRefusal), kNeighbourhoodKeyword,
+        fmt::format("expected at least the {} coefficients of a quadratic polynomial in {} parameters, or 0, found {}",
+                    coefficients, n, size)};
+  }
+  if (!available || *available >= size) return std::nullopt;
+  return SettingRefusal{
+      "Error: Population size and/or initial No. of generations too small for surrogate modelling optimisation",
+      kGenerationsKeyword,
+      fmt::format("expected at least Neighbourhood_Size = {} evaluated sets before the surrogate is fitted, found {}",
+                  size, *available)};
+}
+
 std::string_view surrogateModelName(const SurrogateSettings& settings) {
-  return settings.modelType == 1 ? "Gaussian process" : "quadratic polynomial";
+  return kModelNames[settings.modelType == SurrogateModelType::gaussianProcess ? 1 : 0].name;
 }
 
 std::size_t neighbourhoodSize(const SurrogateSettings& settings, std::size_t n) {
   if (settings.neighbourhoodSize > 0) return static_cast<std::size_t>(settings.neighbourhoodSize);
   const std::size_t coefficients = quadraticCoefficientCount(n);
-  return settings.modelType == 1 ? std::min(3 * coefficients, kMostNeighbours) : 3 * coefficients / 2;
+  return settings.modelType == SurrogateModelType::gaussianProcess ? std::min(3 * coefficients, kMostNeighbours)
+                                                                   : 3 * coefficients / 2;
 }
 
 std::size_t leastSetCount(const SurrogateSettings& settings, std::size_t n) {
   // Fewer than a plane needs say nothing about the shape of the objective.
-  return settings.modelType == 0 ? quadraticCoefficientCount(n) : n + 2;
+  return settings.modelType == SurrogateModelType::quadraticPolynomial ? quadraticCoefficientCount(n) : n + 2;
 }
 
 std::size_t proposalsPerRun(const SurrogateSettings& settings) {

@@ -11,6 +11,7 @@
 #include "algorithms/numbers/search_bounds.h"
 #include "algorithms/surrogate/surrogate_model.h"
 #include "common/parameter_set.h"
+#include "common/settings/keyword_row.h"
 
 namespace mirevo {
 
@@ -20,12 +21,22 @@ struct PredictedMinimum {
   std::size_t centre = 0;  ///< place of that point among those asked about
 };
 
+enum class SurrogateModelType : std::int32_t { quadraticPolynomial = 0, gaussianProcess = 1 };
+
 struct SurrogateSettings {
-  std::int32_t samplingRate = 25;       ///< per cent of the proposals that the model evaluates
-  std::int32_t neighbourhoodSize = 0;   ///< 0: chosen by model type and number of parameters
-  std::int32_t modelType = 1;           ///< 0 quadratic polynomial, 1 Gaussian process
+  std::int32_t samplingRate = 25;      ///< per cent of the proposals that the model evaluates
+  std::int32_t neighbourhoodSize = 0;  ///< 0: chosen by model type and number of parameters
+  SurrogateModelType modelType = SurrogateModelType::gaussianProcess;
   std::int32_t initialGenerations = 1;  ///< loops evaluated by the model alone
 };
+/// The section SURROGATE_MODEL_PARAMETERS.
+const SettingSection<SurrogateSettings>& surrogateSection();
+
+/// That a neighbourhood that is given suffices for the model in n parameters, and that so many parameter sets as it
+/// needs are evaluated before the model is used: `available` are those of the initial sample and the initial
+/// generations.
+std::optional<SettingRefusal> validateSurrogateControl(const SurrogateSettings& settings, std::size_t n,
+                                                       std::optional<double> available);
 
 /// "quadratic polynomial" or "Gaussian process".
 std::string_view surrogateModelName(const SurrogateSettings& settings);

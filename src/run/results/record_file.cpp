@@ -12,6 +12,7 @@
 
 #include "common/fatal_error.h"
 #include "common/file_copy.h"
+#include "common/files.h"
 #include "platform/signals/signal_state.h"
 
 namespace mirevo {
@@ -121,6 +122,16 @@ std::string keepEarlierFile(const std::string& path) {
     failToKeep(path, fmt::format("It cannot be renamed to {}: {}", kept, reason));
   }
   return kept;
+}
+
+void writeBesideResults(const std::string& path, const std::string& text) {
+  std::string reason;
+  if (readTextFile(path, reason) == text) return;
+  keepEarlierFile(path);
+  RecordFile file;
+  file.open(path);
+  file.append(text);
+  file.close();
 }
 
 }  // namespace mirevo

@@ -53,4 +53,8 @@ class RecordFile final {
 /// to keep, or something that is neither (a device). Throws FatalError when it cannot be looked at or renamed.
 std::string keepEarlierFile(const std::string& path);
 
+/// Writes a text beside the results, whole. A file that holds it already, of a run that is walked through again, stays
+/// as it is; another one is kept under a numbered name. Throws FatalError.
+void writeBesideResults(const std::string& path, const std::string& text);
+
 }  // namespace mirevo

@@ -7,7 +7,6 @@
 
 #include <fmt/format.h>
 
-#include "algorithms/searches/dds.h"
 #include "common/fatal_error.h"
 #include "common/files.h"
 #include "run/results/restart_settings.h"
@@ -18,7 +17,6 @@ namespace {
 constexpr std::string_view kRefusal = "Error: Unable to continue the earlier run";
 constexpr std::string_view kRemedy = "Restart = 0 begins anew and keeps the earlier results under a numbered name.";
 constexpr std::size_t kMostChangesShown = 20;
-constexpr std::int32_t kRepeatFailed = 2;  ///< value of `Restart`
 
 [[noreturn]] void refuse(std::string_view detail) {
   fatalError(kRefusal, fmt::format("{}\n{}", detail, kRemedy));
@@ -57,41 +55,15 @@ int lastWithoutGap(std::span<const ResultTable::Row> rows) {
   return last;
 }
 
-int populationSize(const OptimisationConfig& search) {
-  return search.algorithmType == AlgorithmType::sce ? search.sce.complexCount * search.sce.pointsPerComplex
-                                                    : search.pse.populationSize;
-}
-
-/// SCE and PSE go on behind a raised budget as if it had been so high from the start.
-void raiseBudgetOfPopulation(const OptimisationConfig& search, int earlierBudget, EarlierRun& run) {
-  if (earlierBudget < populationSize(search)) {
-    refuse(
-        fmt::format("Max_No_Evaluations: {} then, {} now: only a search whose budget held its initial sample of {} "
-                    "sets can be taken further",
-                    earlierBudget, search.stopping.maxEvaluations, populationSize(search)));
-  }
-  // What lies behind the earlier budget is the final model run of the search that used it up.
-  const auto isObsolete = [earlierBudget](const ResultTable::Row& row) { return row.number > earlierBudget; };
+/// What the search does with an earlier one of a smaller budget.
+void raiseBudget(const Task& task, int earlierBudget, EarlierRun& run) {
+  const auto raised = task.raisedBudget({earlierBudget, lastWithoutGap(run.rows), run.searches});
+  if (!raised) return;
+  if (!raised->refusal.empty()) refuse(raised->refusal);
+  const auto isObsolete = [&raised](const ResultTable::Row& row) { return row.number > raised->keptEvaluations; };
   run.rows.erase(std::remove_if(run.rows.begin(), run.rows.end(), isObsolete), run.rows.end());
-  run.notes.push_back(fmt::format("Max_No_Evaluations was raised from {} to {}: the search goes on where it ended",
-                                  earlierBudget, search.stopping.maxEvaluations));
-}
-
-/// DDS perturbs ever fewer parameters as its budget is used up, so that another budget is another search: it starts
-/// from the best set of the one before, whose rows are kept.
-void raiseBudgetOfDds(const OptimisationConfig& search, int earlierBudget, EarlierRun& run) {
-  const int before = run.searches.empty() ? 0 : run.searches.back().lastEvaluation;
-  const int last = lastWithoutGap(run.rows);
-  if (last <= before) return;  // it had not begun
-  const bool isFirst = run.searches.empty();
-  const int startPoints =
-      isFirst && !search.initialSample.includeInitialParameters ? ddsStartPointCount(earlierBudget) : 1;
-  run.searches.push_back({earlierBudget, std::min(earlierBudget, std::max(last, before + startPoints))});
-  run.notes.push_back(
-      fmt::format("Max_No_Evaluations was raised from {} to {}: as the probabilities of Dynamically Dimensioned Search "
-                  "depend on it, "
-                  "a new search starts from the best of the first {} evaluations, which are kept",
-                  earlierBudget, search.stopping.maxEvaluations, run.searches.back().lastEvaluation));
+  if (raised->earlier) run.searches.push_back(*raised->earlier);
+  if (!raised->note.empty()) run.notes.push_back(raised->note);
 }
 
 /// The failed model runs behind which no evaluation succeeded: whatever stopped the run may be put right by now.
@@ -138,13 +110,9 @@ std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunCon
     run.notes.push_back(
         fmt::format("Rows of {} that were cut off or damaged are made again: {}", files.results, table.unusableLines));
   }
-  if (config.restart == kRepeatFailed) dropFailuresAtEnd(run);
+  if (config.restart == RestartMode::goOnAndRepeatFailed) dropFailuresAtEnd(run);
   const auto earlierBudget = searchBudget(then);
-  const OptimisationConfig& search = config.optimisation;
-  if (earlierBudget && search.stopping.maxEvaluations > *earlierBudget) {
-    const bool isDds = search.algorithmType == AlgorithmType::dds;
-    (isDds ? raiseBudgetOfDds : raiseBudgetOfPopulation)(search, *earlierBudget, run);
-  }
+  if (earlierBudget && config.task) raiseBudget(*config.task, *earlierBudget, run);
   return run;
 }
 

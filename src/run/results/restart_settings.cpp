@@ -13,12 +13,11 @@
 #include "common/files.h"
 #include "common/text.h"
 #include "common/version.h"
-#include "run/setup/keyword_table.h"
+#include "run/access/setup_schema.h"
 
 namespace mirevo {
 namespace {
 
-constexpr std::string_view kBudgetKeyword = "Max_No_Evaluations";
 constexpr std::string_view kSettingLine = "Setting";
 constexpr std::string_view kFileLine = "File";
 constexpr std::string_view kSearchLine = "Search";
@@ -107,7 +106,8 @@ std::string shownSection(const SettingIndex& index, std::string_view section) {
 }  // namespace
 
 RestartSettings restartSettings(const RunConfig& config) {
-  RestartSettings result{config.resultSettings, {}, config.optimisation.earlierSearches};
+  RestartSettings result{config.resultSettings, {}, {}};
+  if (config.task) result.searches = config.task->earlierSearches;
   std::unordered_map<std::string, FileMark> known;  // many measures may name one file
   for (const ResultSetting& setting : result.settings) {
     if (!namesAFileOfResults(setting) || setting.value.empty()) continue;

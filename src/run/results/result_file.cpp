@@ -39,16 +39,6 @@ void addColumns(std::string& row, std::span<const double> values) {
 
 }  // namespace
 
-std::string columnName(std::string_view name) {
-  std::string harmless(trim(name));
-  for (char& c : harmless) {
-    if (static_cast<unsigned char>(c) < ' ') c = ' ';
-    if (c == '#') c = '_';   // would start a comment in the middle of the header row
-    if (c == '"') c = '\'';  // would open a quoted field that swallows its neighbours
-  }
-  return harmless;
-}
-
 void ResultFile::open(const std::string& path, std::span<const std::string> headLines, const ResultColumns& columns,
                       std::span<const ResultTable::Row> earlierRows) {
   rows_.clear();

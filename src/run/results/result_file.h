@@ -62,7 +62,4 @@ class ResultFile final {
   std::map<int, double> aggregates_;  ///< by row number
 };
 
-/// A name as a column's heading: nothing in it that a reader of tab-separated values takes for something else.
-std::string columnName(std::string_view name);
-
 }  // namespace mirevo

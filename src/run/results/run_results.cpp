@@ -9,7 +9,6 @@
 #include "common/clock.h"
 #include "common/version.h"
 #include "run/results/record_file.h"
-#include "run/setup/setup_summary.h"
 
 namespace mirevo {
 namespace {
@@ -24,8 +23,8 @@ ResultColumns resultColumns(const RunConfig& config, const SearchSpace& space) {
 
 /// The head of the result file but for when the run was started.
 std::vector<std::string> headLines(const RunConfig& config) {
-  std::vector<std::string> lines{config.title, fmt::format("Mirevo {}", programVersion()), taskName(config)};
-  if (config.drawsRandomNumbers()) lines.push_back(fmt::format("Random seed: {}", config.randomSeed));
+  std::vector<std::string> lines{config.title, fmt::format("Mirevo {}", programVersion()), config.taskDescription()};
+  if (config.drawsRandomNumbers()) lines.push_back(fmt::format("Random seed: {}", config.task->randomSeed));
   lines.push_back("Setup file: " + config.setupFile);
   return lines;
 }
@@ -38,10 +37,10 @@ RunResults::RunResults(const RunConfig& config, const SearchSpace& space, const 
       columns_(resultColumns(config, space)),
       failedRuns_(std::filesystem::path(filePrefix).replace_filename(kFailedRunFileName).string(), config.setupName,
                   space.names) {
-  const std::string_view ending = resultFileEnding(config);
+  const std::string_view ending = config.resultFileEnding();
   if (ending.empty()) return;
   files_ = restartFiles(filePrefix + std::string(ending));
-  if (config.restart != 0) earlierRun_ = findEarlierRun(*files_, config, columns_);
+  if (config.restart != RestartMode::startAfresh) earlierRun_ = findEarlierRun(*files_, config, columns_);
 }
 
 std::vector<EarlierSearch> RunResults::earlierSearches() const {
@@ -51,7 +50,7 @@ std::vector<EarlierSearch> RunResults::earlierSearches() const {
 void RunResults::open(const RunConfig& config, std::span<const ObservedSeries> observed,
                       const ObjectiveAggregator& aggregator, RunLog& log) {
   if (!files_) return;
-  if (keepsSimulatedValues(config)) {
+  if (config.keepsSimulatedValues()) {
     std::size_t count = 0;
     for (const ObservedSeries& series : observed) count += series.values.size();
     simulatedValues_.emplace(files_->simulatedValues, count);
@@ -59,7 +58,8 @@ void RunResults::open(const RunConfig& config, std::span<const ObservedSeries> o
   if (earlierRun_) {
     goOn(config, aggregator, log);
   } else {
-    if (config.restart != 0) log.line("Restart: there are no earlier results to go on from, the run begins anew");
+    if (config.restart != RestartMode::startAfresh)
+      log.line("Restart: there are no earlier results to go on from, the run begins anew");
     beginAnew(config, log);
   }
 }

@@ -22,68 +22,20 @@ std::uint32_t hashOf(std::string_view text) {
 
 }  // namespace
 
-std::int64_t OptimisationConfig::populationSize() const {
-  if (algorithmType == AlgorithmType::sce) return std::int64_t{sce.complexCount} * sce.pointsPerComplex;
-  return pse.populationSize;
-}
-
-double OptimisationConfig::evaluationsAfter(double loops) const {
-  const double perLoop = algorithmType == AlgorithmType::sce
-                             ? static_cast<double>(sce.complexCount) * sce.evolutionSteps
-                             : static_cast<double>(pse.populationSize);
-  return static_cast<double>(populationSize()) + perLoop * loops;
-}
-
 std::size_t RunConfig::variableParameterCount() const {
   return static_cast<std::size_t>(std::count_if(
       parameters.begin(), parameters.end(),
       [](const ModelParameter& parameter) { return parameter.parameterType == ParameterType::variable; }));
 }
 
-bool RunConfig::drawsRandomNumbers() const {
-  return simulationOption == SimulationOption::parameterOptimisation ||
-         simulationOption == SimulationOption::uncertaintyAnalysis;
-}
-
 int RunConfig::plannedEvaluations() const {
-  switch (simulationOption) {
-    case SimulationOption::scenarioRuns:
-      return scenario.runCount;
-    case SimulationOption::sensitivityAnalysis: {
-      const int perParameter = sensitivity.local.differencing == 1 ? 2 : 1;
-      return 1 + perParameter * static_cast<int>(variableParameterCount());
-    }
-    case SimulationOption::parameterOptimisation:
-      return optimisation.stopping.maxEvaluations;
-    case SimulationOption::uncertaintyAnalysis:
-      return uncertainty.sampleSize;
-  }
-  return 0;
+  return task ? task->plannedEvaluations(variableParameterCount()) : 0;
 }
 
 int RunConfig::plannedModelRuns() const {
   const int planned = plannedEvaluations();
-  const bool isSearch = simulationOption == SimulationOption::parameterOptimisation;
-  return isSearch && planned < std::numeric_limits<int>::max() ? planned + 1 : planned;
-}
-
-bool keepsSimulatedValues(const RunConfig& config) {
-  return config.simulationOption == SimulationOption::uncertaintyAnalysis ||
-         (config.simulationOption == SimulationOption::sensitivityAnalysis &&
-          config.sensitivity.calculateCovarianceMatrix);
-}
-
-std::string_view resultFileEnding(const RunConfig& config) {
-  switch (config.simulationOption) {
-    case SimulationOption::scenarioRuns:
-    case SimulationOption::uncertaintyAnalysis:
-      return ".dat";
-    case SimulationOption::sensitivityAnalysis:
-      return "_Sensitivity.dat";
-    case SimulationOption::parameterOptimisation:
-      return "_Optimisation.dat";
-  }
-  return {};
+  const bool hasFinalRun = task && task->hasFinalRun();
+  return hasFinalRun && planned < std::numeric_limits<int>::max() ? planned + 1 : planned;
 }
 
 std::string processFolderPrefix(const RunConfig& config) {

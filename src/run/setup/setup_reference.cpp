@@ -2,7 +2,7 @@
 
 #include <fmt/format.h>
 
-#include "run/setup/keyword_table.h"
+#include "run/setup/run_keywords.h"
 
 namespace mirevo {
 namespace {
@@ -10,15 +10,19 @@ namespace {
 constexpr std::string_view kIntroduction = R"(# Setup reference
 
 Every section and keyword of a setup file, in the order in which they are read. This page is made from the program's
-keyword table; do not edit it.
+keyword rows; do not edit it.
 
-- The sections stand inside `[{}]`. `a/b` is section `b` inside section `a`. In the name of an item section `n` is the
-  item's number, counting from 1 without padding; `{}` says how many there are.
-- A keyword without a default is required, and so is a section that is read, unless its heading says otherwise. A section that the run does
-  not need may be left out.
-- Types: *integer* (32 bits), *real* (an integer will do), *text* and *file* (between quotes, at most {} bytes), *name* (a text that is not
-  blank), *free text* (of any length), *list* (reals with commas between them), *date*. See [file formats](file-formats.md)
-  for how they are written. A file's name is relative to the setup file's folder, or absolute.
+- The sections are inside `[{}]`. `a/b` is section `b` inside section `a`. In the name of an item section `n` is the item's
+  number, counting from 1 without padding; `{}` says how many there are.
+- A keyword without a default is required, and so is a section that is read, unless its heading says otherwise. A section
+  that the run does not need may be left out.
+- Types: *integer* (32 bits), *real* (an integer is accepted), *text* and *file* (between quotes, at most {} bytes), *name*
+  (a text that is not blank), *free text* (of any length), *list* (reals with commas between them), *date*, *code*. See
+  [file formats](file-formats.md) for how they are written. A file's name is relative to the setup file's folder, or
+  absolute.
+- A *code* is one of a few values, given by its number or by its name between quotes, in upper or lower case:
+  `Algorithm_Type = 2` and `Algorithm_Type = 'DDS'` are the same. The names are below the table of their section; what has
+  no number there has a name only.
 - Unknown sections and keywords are not read; the run log warns of them and names the nearest known one.
 )";
 
@@ -26,6 +30,8 @@ std::string_view typeName(KeywordType type) {
   switch (type) {
     case KeywordType::integer:
       return "integer";
+    case KeywordType::code:
+      return "code";
     case KeywordType::real:
       return "real";
     case KeywordType::name:
@@ -48,25 +54,37 @@ std::string_view typeName(KeywordType type) {
 std::string defaultText(const KeywordRow& row) {
   if (row.isRequired()) return "required";
   return row.isLeftOutByDefault() || row.type == KeywordType::textLines ? "none"
-                                                                        : fmt::format("`{}`", row.defaultValue);
+                                                                        : fmt::format("`{}`", row.facts.defaultValue);
 }
 
-std::string keywordTableOf(std::string_view section) {
-  std::string text = "| keyword | type | default | valid | unit | meaning |\n|---|---|---|---|---|---|\n";
-  for (const KeywordRow& row : keywordsOf(section)) {
-    text += fmt::format("| `{}` | {} | {} | {} | {} | {} |\n", row.name, typeName(row.type), defaultText(row),
-                        row.range.text(), row.unit, row.meaning);
+std::string codesText(const KeywordRow& row) {
+  std::string text;
+  for (const CodeName& code : row.facts.codes) {
+    if (!text.empty()) text += ", ";
+    text += code.code ? fmt::format("{} `'{}'`", *code.code, code.name) : fmt::format("`'{}'`", code.name);
   }
   return text;
+}
+
+std::string keywordTableOf(const SectionRow& section) {
+  std::string text = "| keyword | type | default | valid | unit | meaning |\n|---|---|---|---|---|---|\n";
+  std::string codes;
+  for (const KeywordRow& row : section.keywords) {
+    text += fmt::format("| `{}` | {} | {} | {} | {} | {} |\n", row.name(), typeName(row.type), defaultText(row),
+                        row.facts.range.text(), row.facts.unit, row.facts.meaning);
+    const bool isFlag = row.facts.codes.data() == std::data(kNoYesNames);
+    if (!row.facts.codes.empty() && !isFlag) codes += fmt::format("- `{}`: {}\n", row.name(), codesText(row));
+  }
+  return codes.empty() ? text : text + "\n" + codes;
 }
 
 }  // namespace
 
 std::string setupReference() {
   std::string page = fmt::format(kIntroduction, kSetupTarget, kItemCountKeyword, kFieldWidth);
-  for (const SectionRow& section : sectionTable()) {
-    page += fmt::format("\n## {}\n\nRead {}. {}\n", section.path, section.readWhen, section.meaning);
-    if (!keywordsOf(section.path).empty()) page.append("\n").append(keywordTableOf(section.path));
+  for (const SectionRow* section : setupSchema().sections()) {
+    page += fmt::format("\n## {}\n\nRead {}. {}\n", section->path, section->readWhen, section->meaning);
+    if (!section->keywords.empty()) page.append("\n").append(keywordTableOf(*section));
   }
   return page;
 }

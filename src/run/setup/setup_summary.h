@@ -9,9 +9,6 @@
 
 namespace mirevo {
 
-/// The chosen task, "Parameter optimisation: Dynamically Dimensioned Search"; "none" for one that does not exist.
-std::string taskName(const RunConfig& config);
-
 /// How a measure comes about: "root mean square", "written by the model".
 std::string_view statisticName(const OutputMeasure& measure);
 

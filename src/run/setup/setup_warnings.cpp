@@ -22,9 +22,9 @@ class EntryCheck final {
       const std::string name = itemPattern(section->name());
       const std::string path = pattern.empty() ? name : fmt::format("{}/{}", pattern, name);
       const bool isFirst = node.section(section->name()) == section.get();
-      if (findSection(path) == nullptr) {
+      if (file_.schema().findSection(path) == nullptr) {
         warn(section->position(), "section", section->name(),
-             nearestName(section->name(), sectionNamesInside(pattern)));
+             nearestName(section->name(), file_.schema().sectionNamesInside(pattern)));
       } else if (!isFirst) {
         warnRepeated(section->position(), "section", section->name(), node.section(section->name())->position());
       } else {
@@ -39,10 +39,12 @@ class EntryCheck final {
 
  private:
   void checkKeyword(const KdxSection& node, const KdxKeyword& keyword, const std::string& pattern) {
-    const KeywordRow* row = findKeyword(pattern, keyword.name);
+    const KeywordRow* row = file_.schema().findKeyword(pattern, keyword.name);
     if (row == nullptr) {
       std::vector<std::string> known;
-      for (const KeywordRow& other : keywordsOf(pattern)) known.emplace_back(other.name);
+      if (const SectionRow* section = file_.schema().findSection(pattern)) {
+        for (const KeywordRow& other : section->keywords) known.emplace_back(other.name());
+      }
       warn(keyword.position, "keyword", keyword.name, nearestName(keyword.name, known));
     } else if (row->type != KeywordType::textLines && node.keyword(keyword.name) != &keyword) {
       warnRepeated(keyword.position, "keyword", keyword.name, node.keyword(keyword.name)->position);
@@ -61,7 +63,7 @@ class EntryCheck final {
   }
 
   void report(KdxPosition position, const std::string& text) {
-    if (++count_ <= kMostWarnings) file_.log().warning(fmt::format("{}: {}", file_.place(position), text));
+    if (++count_ <= kMostWarnings) file_.log().warning(fmt::format("{}: {}", file_.location(position), text));
   }
 
   SetupFile& file_;
@@ -77,7 +79,7 @@ void warnAboutUnusedEntries(SetupFile& file) {
   const KdxSection* target = root.section(kSetupTarget);
   if (target == nullptr) return;
   if (const KdxSection* second = root.section(kSetupTarget, 2)) {
-    file.log().warning(fmt::format("{}: a second [{}] is not read", file.place(second->position()), kSetupTarget));
+    file.log().warning(fmt::format("{}: a second [{}] is not read", file.location(second->position()), kSetupTarget));
   }
   check.checkInside(*target, "");
   check.finish();

@@ -5,7 +5,7 @@
 #include <vector>
 
 #include "parameters/template_file.h"
-#include "run/setup/setup_access.h"
+#include "run/access/setup_access.h"
 
 namespace mirevo {
 

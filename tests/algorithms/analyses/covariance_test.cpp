@@ -157,7 +157,8 @@ std::vector<Certified> certifiedSets() {
 TEST(ParameterCovariance, ReproducesCertifiedStandardDeviations) {
   for (const Certified& set : certifiedSets()) {
     const SearchSpace space = spaceOf(set.parameters);
-    const PerturbationPlan plan = planPerturbations({1, 1, 1e-4}, space, space.initial);
+    const PerturbationPlan plan =
+        planPerturbations({Differencing::central, PerturbationOption::value, 1e-4}, space, space.initial);
     std::vector<std::vector<double>> simulated;
     for (const ParameterSet& parameters : plan.sets) {
       simulated.emplace_back();

@@ -35,6 +35,10 @@ SearchSpace spaceOf(const std::vector<Parameter>& parameters) {
 constexpr auto kNone = TransformationType::none;
 constexpr auto kLog = TransformationType::logarithmic;
 constexpr auto kInteger = TransformationType::integer;
+constexpr auto kForward = Differencing::forward;
+constexpr auto kCentral = Differencing::central;
+constexpr auto kOfRange = PerturbationOption::range;
+constexpr auto kOfValue = PerturbationOption::value;
 
 TEST(PlanPerturbations, TakesItsStepsInsideTheBounds) {
   struct Case {
@@ -44,23 +48,23 @@ TEST(PlanPerturbations, TakesItsStepsInsideTheBounds) {
     double minus, plus;            // values of the parameter; equal: not perturbed
   };
   const Case cases[] = {
-      {"forward, of the range", {kNone, 2, 0, 10}, {0, 0, 0.1}, 2, 3},
-      {"central, of the range", {kNone, 2, 0, 10}, {1, 0, 0.1}, 1, 3},
-      {"of a negative value", {kNone, -2, -10, 10}, {0, 1, 0.1}, -2, -1.8},
-      {"up to the bound itself", {kNone, 9, 0, 10}, {0, 0, 0.1}, 9, 10},
-      {"inwards at the upper bound", {kNone, 10, 0, 10}, {0, 0, 0.1}, 9, 10},
-      {"central at the lower bound", {kNone, 0, 0, 10}, {1, 0, 0.1}, 0, 1},
-      {"no room either way", {kNone, 4, 0, 10}, {1, 0, 0.8}, 4, 10},
-      {"no room, more below", {kNone, 6, 0, 10}, {1, 0, 0.8}, 0, 6},
-      {"equal bounds", {kNone, 3, 3, 3}, {1, 0, 0.1}, 3, 3},
-      {"equal bounds, of the value", {kNone, 3, 3, 3}, {0, 1, 0.1}, 3, 3},
-      {"value 0", {kNone, 0, -1, 1}, {0, 1, 0.1}, 0, 0},
-      {"logarithmic, of the range", {kLog, 0, -2, 2}, {1, 0, 0.25}, -1, 1},
-      {"logarithmic, of the value", {kLog, 0, -2, 2}, {1, 1, 0.5}, -std::log(1.5), std::log(1.5)},
-      {"integer, at least one", {kInteger, 5, 0, 11}, {1, 0, 0.01}, 4, 6},
-      {"integer, rounded", {kInteger, 5, 0, 11}, {1, 0, 0.26}, 2, 8},
-      {"integer at its largest value", {kInteger, 10, 0, 11}, {0, 0, 0.01}, 9, 10},
-      {"integer of one value", {kInteger, 4, 4, 5}, {0, 0, 0.01}, 4, 4},
+      {"forward, of the range", {kNone, 2, 0, 10}, {kForward, kOfRange, 0.1}, 2, 3},
+      {"central, of the range", {kNone, 2, 0, 10}, {kCentral, kOfRange, 0.1}, 1, 3},
+      {"of a negative value", {kNone, -2, -10, 10}, {kForward, kOfValue, 0.1}, -2, -1.8},
+      {"up to the bound itself", {kNone, 9, 0, 10}, {kForward, kOfRange, 0.1}, 9, 10},
+      {"inwards at the upper bound", {kNone, 10, 0, 10}, {kForward, kOfRange, 0.1}, 9, 10},
+      {"central at the lower bound", {kNone, 0, 0, 10}, {kCentral, kOfRange, 0.1}, 0, 1},
+      {"no room either way", {kNone, 4, 0, 10}, {kCentral, kOfRange, 0.8}, 4, 10},
+      {"no room, more below", {kNone, 6, 0, 10}, {kCentral, kOfRange, 0.8}, 0, 6},
+      {"equal bounds", {kNone, 3, 3, 3}, {kCentral, kOfRange, 0.1}, 3, 3},
+      {"equal bounds, of the value", {kNone, 3, 3, 3}, {kForward, kOfValue, 0.1}, 3, 3},
+      {"value 0", {kNone, 0, -1, 1}, {kForward, kOfValue, 0.1}, 0, 0},
+      {"logarithmic, of the range", {kLog, 0, -2, 2}, {kCentral, kOfRange, 0.25}, -1, 1},
+      {"logarithmic, of the value", {kLog, 0, -2, 2}, {kCentral, kOfValue, 0.5}, -std::log(1.5), std::log(1.5)},
+      {"integer, at least one", {kInteger, 5, 0, 11}, {kCentral, kOfRange, 0.01}, 4, 6},
+      {"integer, rounded", {kInteger, 5, 0, 11}, {kCentral, kOfRange, 0.26}, 2, 8},
+      {"integer at its largest value", {kInteger, 10, 0, 11}, {kForward, kOfRange, 0.01}, 9, 10},
+      {"integer of one value", {kInteger, 4, 4, 5}, {kForward, kOfRange, 0.01}, 4, 4},
   };
   for (const Case& c : cases) {
     const SearchSpace space = spaceOf({{kNone, 7, 0, 14}, c.parameter});
@@ -78,7 +82,7 @@ TEST(PlanPerturbations, TakesItsStepsInsideTheBounds) {
 
 TEST(PlanPerturbations, NamesAStepThatRoundsAway) {
   const SearchSpace space = spaceOf({{kNone, 1e18, 1e18 - 1e4, 1e18 + 1e4}});
-  const PerturbationPlan plan = planPerturbations({0, 0, 1e-6}, space, space.initial);
+  const PerturbationPlan plan = planPerturbations({kForward, kOfRange, 1e-6}, space, space.initial);
   EXPECT_EQ(plan.differences[0].problem, "the perturbation is too small to change its value");
 }
 
@@ -93,7 +97,7 @@ EvaluationResult evaluate(const ParameterSet& p) {
 TEST(LocalSensitivity, HasDerivativesScaledCompositeAndRanking) {
   FunctionEvaluator evaluator(evaluate);
   const SearchSpace space = spaceOf({{kNone, 2, 0, 4}, {kNone, 1, 0, 10}, {kLog, 1, 0, 2}});
-  const LocalSensitivity central = localSensitivity({1, 0, 0.1}, space, evaluator);
+  const LocalSensitivity central = localSensitivity({kCentral, kOfRange, 0.1}, space, evaluator);
   ASSERT_EQ(evaluator.batches.size(), 1U);
   EXPECT_EQ(evaluator.batches[0].size(), 7U);
   EXPECT_EQ(evaluator.batches[0][0], space.initial);
@@ -105,7 +109,7 @@ TEST(LocalSensitivity, HasDerivativesScaledCompositeAndRanking) {
   EXPECT_NEAR(central.objectives.composite[1], 20.0 / 2.2 / std::sqrt(2.0), 1e-13);
   EXPECT_THAT(central.ranking, ElementsAre(1, 2, 0));
 
-  const LocalSensitivity forward = localSensitivity({0, 1, 0.1}, space, evaluator);
+  const LocalSensitivity forward = localSensitivity({kForward, kOfValue, 0.1}, space, evaluator);
   EXPECT_EQ(evaluator.batches[1].size(), 4U);
   EXPECT_NEAR(forward.measures.derivatives[0][0], 4.2, 1e-13);
   EXPECT_NEAR(forward.objectives.scaled[1][0], 2.0 / 2.2, 1e-13);  // an elasticity
@@ -122,7 +126,7 @@ TEST(LocalSensitivity, LeavesAFailedRunsColumnOutByName) {
     return result;
   });
   const SearchSpace space = spaceOf({{kNone, 2, 0, 4}, {kNone, 1, 0, 10}, {kLog, 1, 0, 2}});
-  const LocalSensitivity result = localSensitivity({0, 0, 0.1}, space, evaluator);
+  const LocalSensitivity result = localSensitivity({kForward, kOfRange, 0.1}, space, evaluator);
   EXPECT_TRUE(std::isnan(result.measures.derivatives[1][0]));
   EXPECT_NEAR(result.measures.derivatives[0][0], 4.4, 1e-13);
   EXPECT_THAT(result.ranking, ElementsAre(2, 0, 1));
@@ -139,7 +143,7 @@ TEST(LocalSensitivity, OfAFailedBaseSetHasCentralDerivativesOnly) {
     return result;
   });
   const SearchSpace space = spaceOf({{kNone, 2, 0, 4}, {kNone, 1, 1, 10}, {kLog, 1, 1, 1}});
-  const LocalSensitivity result = localSensitivity({1, 0, 0.1}, space, evaluator);
+  const LocalSensitivity result = localSensitivity({kCentral, kOfRange, 0.1}, space, evaluator);
   EXPECT_NEAR(result.measures.derivatives[0][0], 4.0, 1e-13);
   EXPECT_TRUE(std::isnan(result.measures.derivatives[1][0]));  // one-sided at its bound
   EXPECT_EQ(result.plan.differences[2].problem, "its bounds are equal");
@@ -149,7 +153,7 @@ TEST(LocalSensitivity, OfAFailedBaseSetHasCentralDerivativesOnly) {
 
 TEST(Linearise, LeavesTheColumnOfAFailedSetUnknown) {
   const SearchSpace space = spaceOf({{kNone, 2, 0, 4}, {kNone, 1, 0, 10}});
-  const PerturbationPlan plan = planPerturbations({0, 0, 0.5}, space, space.initial);
+  const PerturbationPlan plan = planPerturbations({kForward, kOfRange, 0.5}, space, space.initial);
   const std::vector<std::vector<double>> simulated = {{1, 2}, {2, 6}, {}};
   const auto model = linearise(plan, simulated, std::vector<double>{0.5, 2.5}, {1.0, 4.0});
   ASSERT_TRUE(model.has_value());

@@ -20,7 +20,7 @@ double normalProbability(double z) {
 }
 
 TEST(UncertaintySample, DrawsColumnByColumnFromTheSeed) {
-  const UncertaintySettings settings{0, 3, {{10.0, 2.0}, {-1.0, 0.5}}};
+  const UncertaintySettings settings{SamplingType::simpleRandom, 3, {{10.0, 2.0}, {-1.0, 0.5}}};
   const std::vector<ParameterSet> sample = uncertaintySample(settings, 5);
   UniformGenerator random(5);
   for (std::size_t j = 0; j < 2; ++j) {
@@ -35,7 +35,7 @@ TEST(UncertaintySample, DrawsColumnByColumnFromTheSeed) {
 
 TEST(UncertaintySample, LatinHypercubeHitsEachStratumOnceInRankOrder) {
   for (const int n : {4, 1000}) {
-    const UncertaintySettings settings{1, n, {{0.0, 1.0}, {0.0, 1.0}, {3.0, 0.0}}};
+    const UncertaintySettings settings{SamplingType::latinHypercube, n, {{0.0, 1.0}, {0.0, 1.0}, {3.0, 0.0}}};
     const std::vector<ParameterSet> sample = uncertaintySample(settings, 17);
     for (std::size_t j = 0; j < 2; ++j) {
       std::set<int> strata;
@@ -43,7 +43,7 @@ TEST(UncertaintySample, LatinHypercubeHitsEachStratumOnceInRankOrder) {
       EXPECT_EQ(strata.size(), n);
     }
     // The permutation ranks the deviates that simple random sampling would use.
-    const std::vector<ParameterSet> simple = uncertaintySample({0, n, {{0.0, 1.0}}}, 17);
+    const std::vector<ParameterSet> simple = uncertaintySample({SamplingType::simpleRandom, n, {{0.0, 1.0}}}, 17);
     for (std::size_t i = 1; i < sample.size(); ++i) {
       EXPECT_EQ(sample[i][0] < sample[0][0], simple[i][0] < simple[0][0]) << i;
       EXPECT_EQ(sample[i][2], 3.0);
@@ -52,7 +52,8 @@ TEST(UncertaintySample, LatinHypercubeHitsEachStratumOnceInRankOrder) {
 }
 
 TEST(UncertaintySample, HasTheMomentsItIsAskedFor) {
-  const std::vector<ParameterSet> sample = uncertaintySample({1, 2000, {{-4.0, 3.0}, {7.0, 0.1}}}, 1);
+  const std::vector<ParameterSet> sample =
+      uncertaintySample({SamplingType::latinHypercube, 2000, {{-4.0, 3.0}, {7.0, 0.1}}}, 1);
   UncertaintyOutcome outcome{sample, {}};
   const UncertaintySummary summary = summariseUncertainty(outcome);
   EXPECT_NEAR(summary.parameters[0].mean, -4.0, 0.01);
@@ -69,7 +70,7 @@ TEST(UncertaintyAnalysis, EvaluatesOneBatchAndLeavesFailuresOut) {
     if (call > 3) result.failure = EvaluationFailure{};
     return result;
   });
-  const UncertaintyOutcome outcome = uncertaintyAnalysis({0, 5, {{1.0, 0.0}}}, 1, evaluator);
+  const UncertaintyOutcome outcome = uncertaintyAnalysis({SamplingType::simpleRandom, 5, {{1.0, 0.0}}}, 1, evaluator);
   ASSERT_EQ(evaluator.batches.size(), 1U);
   EXPECT_EQ(evaluator.batches[0].size(), 5U);
   const UncertaintySummary summary = summariseUncertainty(outcome);
@@ -95,7 +96,7 @@ TEST(UncertaintyAnalysis, EvaluatesOneBatchAndLeavesFailuresOut) {
 
 TEST(UncertaintyAnalysis, EvaluatesAnEmptyBatchWithoutParameters) {
   FunctionEvaluator evaluator([](const ParameterSet&) { return resultOf(0.0); });
-  EXPECT_TRUE(uncertaintyAnalysis({0, 5, {}}, 1, evaluator).results.empty());
+  EXPECT_TRUE(uncertaintyAnalysis({SamplingType::simpleRandom, 5, {}}, 1, evaluator).results.empty());
   EXPECT_EQ(evaluator.batches.size(), 1U);
   EXPECT_EQ(evaluator.evaluationCount, 0);
 }

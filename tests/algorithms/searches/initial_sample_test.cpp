@@ -63,7 +63,7 @@ TEST(InitialSample, DrawsWithinBoundsTheInitialSetFirst) {
   for (int generation = 0; generation <= 3; ++generation) {
     for (const bool isIncluded : {true, false}) {
       UniformGenerator random(7);
-      const auto sample = drawInitialSample({isIncluded, generation, ""}, {}, bounds, 9, random);
+      const auto sample = drawInitialSample({isIncluded, SampleGeneration{generation}, ""}, {}, bounds, 9, random);
       ASSERT_EQ(sample.size(), 9U);
       EXPECT_EQ(sample.front() == bounds.initial, isIncluded) << generation;
       for (const ParameterSet& set : sample) {
@@ -71,7 +71,8 @@ TEST(InitialSample, DrawsWithinBoundsTheInitialSetFirst) {
                                      testing::AllOf(testing::Ge(5), testing::Le(9))));
       }
       UniformGenerator again(-7);
-      EXPECT_EQ(drawInitialSample({isIncluded, generation, ""}, {}, bounds, 9, again), sample) << generation;
+      EXPECT_EQ(drawInitialSample({isIncluded, SampleGeneration{generation}, ""}, {}, bounds, 9, again), sample)
+          << generation;
     }
   }
 }
@@ -128,9 +129,9 @@ TEST(InitialSample, TakesTheFirstSetsOfAFileAndRefusesOneThatHoldsTooFew) {
   const SearchBounds bounds{{0}, {1}, {0.5}};
   const std::vector<ParameterSet> given{{0.1}, {0.2}, {0.3}};
   UniformGenerator random(1);
-  EXPECT_THAT(drawInitialSample({true, 4, "s.txt"}, given, bounds, 3, random),
+  EXPECT_THAT(drawInitialSample({true, SampleGeneration::fromFile, "s.txt"}, given, bounds, 3, random),
               ElementsAre(ParameterSet{0.5}, ParameterSet{0.1}, ParameterSet{0.2}));
-  EXPECT_THROW(drawInitialSample({false, 4, "s.txt"}, given, bounds, 4, random), FatalError);
+  EXPECT_THROW(drawInitialSample({false, SampleGeneration::fromFile, "s.txt"}, given, bounds, 4, random), FatalError);
 }
 
 }  // namespace

@@ -7,6 +7,9 @@
 #include <gtest/gtest.h>
 
 #include "algorithms/function_evaluator.h"
+#include "algorithms/searches/pse.h"
+#include "algorithms/searches/sce.h"
+#include "algorithms/surrogate/proposal_selector.h"
 #include "common/fatal_error.h"
 
 namespace mirevo {
@@ -65,8 +68,8 @@ TEST(OptimisationDriver, WarnsOnceOfANegativeBestValueOfTheSample) {
         [offset = shift](const ParameterSet& x) { return testing::resultOf(x[0] * x[0] + offset); });
     UniformGenerator random(1);
     std::vector<std::string> lines;
-    runPopulationSearch({}, {{{-1}, {1}, {0.7}}, {400, 1000, 0.0}, {}, {}, evaluator, random},
-                        [&](std::string_view line) { lines.emplace_back(line); });
+    SceMethod().run({{{-1}, {1}, {0.7}}, {400, 1000, 0.0}, {}, {}, evaluator, random},
+                    [&](std::string_view line) { lines.emplace_back(line); });
     EXPECT_EQ(std::count_if(lines.begin(), lines.end(),
                             [](const std::string& line) {
                               return line.starts_with("Warning: The best objective value is negative.");
@@ -89,13 +92,11 @@ TEST(OptimisationDriver, SendsWhatTheSurrogateModelChoseInItsOwnMode) {
   };
   ModeRecorder evaluator;
   UniformGenerator random(1);
-  PopulationSearchSettings settings;
-  settings.algorithm = PopulationAlgorithm::pse;
-  settings.usesSurrogate = true;
-  settings.pse.populationSize = 8;
-  settings.surrogate.initialGenerations = 1;
-  const SearchSummary summary =
-      runPopulationSearch(settings, {{{-1}, {1}, {0.7}}, {24, 1000, 0.0}, {}, {}, evaluator, random}, {});
+  PseMethod method;
+  method.settings.populationSize = 8;
+  const SearchBounds bounds{{-1}, {1}, {0.7}};
+  ProposalSelector selector({.initialGenerations = 1}, bounds);
+  const SearchSummary summary = method.run({bounds, {24, 1000, 0.0}, {}, {}, evaluator, random, &selector}, {});
   EXPECT_EQ(summary.evaluationCount, 24);
   using enum DispatchMode;
   EXPECT_THAT(evaluator.modes, ::testing::ElementsAre(task, task, surrogateSelected));

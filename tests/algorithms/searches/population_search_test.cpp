@@ -141,7 +141,7 @@ TEST_P(EitherSearch, NeitherFixedParametersNorFailuresStallItOrMakeANotANumber) 
       FunctionEvaluator evaluator(function);
       UniformGenerator random(6);
       const SearchBounds bounds{{-1, 0.1, -1}, {1, 0.1, 1}, {0.9, 0.1, 0.9}};
-      ProposalSelector selector({50, 20, modelType, 1}, bounds);
+      ProposalSelector selector({50, 20, SurrogateModelType{modelType}, 1}, bounds);
       const int budget = modelType == 1 ? 200 : 1500;
       const auto search =
           makeSearch(GetParam(), 2,
@@ -192,7 +192,7 @@ TEST_P(EitherSearch, IsHelpedByTheSurrogateModelWithinTheSameBudgetAndRules) {
     for (int seed = 1; seed <= 10; ++seed) {
       FunctionEvaluator evaluator([](const ParameterSet& x) { return resultOf(testing::rosenbrock(x)); });
       UniformGenerator random(seed);
-      ProposalSelector selector({25, 0, type, 1}, bounds);
+      ProposalSelector selector({25, 0, SurrogateModelType{type}, 1}, bounds);
       const auto search =
           makeSearch(GetParam(), 4, {bounds, onBudget(400), {}, {}, evaluator, random, type < 0 ? nullptr : &selector});
       const SearchSummary summary = runToEnd(*search);
@@ -211,7 +211,8 @@ TEST_P(EitherSearch, PutsAPredictedMinimumInThePlaceOfThePointThatItRefines) {
   const auto bowl = [](const ParameterSet& x) { return 1.0 + (x[0] - 1) * (x[0] - 1) + 2 * (x[1] + 2) * (x[1] + 2); };
   FunctionEvaluator evaluator([&bowl](const ParameterSet& x) { return resultOf(bowl(x)); });
   UniformGenerator random(2);
-  ProposalSelector selector({25, 0, 0, 1}, bounds);  // of the polynomial, whose minimum is the function's
+  ProposalSelector selector({25, 0, SurrogateModelType::quadraticPolynomial, 1},
+                            bounds);  // of the polynomial, whose minimum is the function's
   const auto search = makeSearch(GetParam(), 2, {bounds, onBudget(200), {}, {}, evaluator, random, &selector}, 1);
   ASSERT_EQ(search->initialise(), kSearchOk);
   ASSERT_EQ(search->advance(), kSearchOk);
@@ -226,7 +227,7 @@ TEST_P(EitherSearch, PutsAPredictedMinimumInThePlaceOfThePointThatItRefines) {
 SearchProblem fromThreePoints(Evaluator& evaluator, UniformGenerator& random) {
   InitialSampleSettings fromFile;
   fromFile.includeInitialParameters = false;
-  fromFile.generation = 4;
+  fromFile.generation = SampleGeneration::fromFile;
   return {{{0, 0}, {20, 20}, {0, 0}}, onBudget(100), fromFile, {{5, 5}, {6, 5}, {5, 7}}, evaluator, random};
 }
 

@@ -142,7 +142,7 @@ TEST(GaussianProcess, RefusesOrSurvivesDegeneratePoints) {
 TEST(ProposalSelector, RanksByPredictionAndLeavesFailuresOut) {
   const SearchBounds bounds{{-10}, {10}, {0}};
   for (const int type : {0, 1}) {
-    ProposalSelector selector({40, 100, type, 2}, bounds);
+    ProposalSelector selector({40, 100, SurrogateModelType{type}, 2}, bounds);
     EXPECT_EQ(selector.proposalsPerRun(), 3U);
     for (int i = -5; i <= 5; ++i) {
       EvaluationResult result;
@@ -167,7 +167,7 @@ TEST(ProposalSelector, FindsTheModelsMinimumInItsNeighbourhoodOnce) {
     return result;
   };
   for (const int type : {0, 1}) {
-    ProposalSelector selector({50, 30, type, 1}, bounds);
+    ProposalSelector selector({50, 30, SurrogateModelType{type}, 1}, bounds);
     EXPECT_TRUE(selector.minima(std::vector<ParameterSet>{{0, 3, 0}}).empty());
     UniformGenerator random(5);
     for (const auto& point : latinHypercube(30, 2, random)) {
@@ -197,7 +197,7 @@ TEST(ProposalSelector, MovesAnIntegerParameterOfFewValuesEitherWay) {
       for (const int wanted : {0, values - 1}) {
         SCOPED_TRACE(testing::Message() << "type " << type << ", " << values << " values, wanted " << wanted);
         const SearchBounds bounds{{0, 0}, {static_cast<double>(values), 1}, {0, 0}, {true, false}};
-        ProposalSelector selector({25, 18, type, 1}, bounds);
+        ProposalSelector selector({25, 18, SurrogateModelType{type}, 1}, bounds);
         UniformGenerator random(1);
         for (const auto& point : latinHypercube(18, 2, random)) {
           const ParameterSet set{values * point[0], point[1]};
@@ -216,7 +216,7 @@ TEST(ProposalSelector, MovesAnIntegerParameterOfFewValuesEitherWay) {
 
 TEST(ProposalSelector, StaysAwayFromWhereARunFailed) {
   const SearchBounds bounds{{1, 1}, {13, 13}, {1, 1}, {true, false}};
-  ProposalSelector selector({25, 0, 0, 1}, bounds);
+  ProposalSelector selector({25, 0, SurrogateModelType::quadraticPolynomial, 1}, bounds);
   const auto note = [&selector](double x, double y) {
     EvaluationResult result;
     result.aggregate = (std::floor(x) - 7) * (std::floor(x) - 7) + (y - 5) * (y - 5);
@@ -241,7 +241,7 @@ TEST(ProposalSelector, StaysAwayFromWhereARunFailed) {
 TEST(ProposalSelector, TakesIntegerParametersAsTheModelDoes) {
   const SearchBounds bounds{{1, 0}, {7, 1}, {1, 0}, {true, false}};
   for (const int type : {0, 1}) {
-    ProposalSelector selector({25, 0, type, 1}, bounds);
+    ProposalSelector selector({25, 0, SurrogateModelType{type}, 1}, bounds);
     const auto note = [&](double x, double y) {
       EvaluationResult result;
       result.aggregate = std::abs(std::floor(x) - 4.0) + y * y;

@@ -111,18 +111,18 @@ class EarlierRunTest : public SetupFixture {
 
 TEST_F(EarlierRunTest, RowsThatTheRunGoesOnFrom) {
   RunConfig config = read("Max_No_Evaluations = 500 => 30");
-  config.restart = 1;
+  config.restart = RestartMode::goOn;
   const std::string rows = row(1) + row(3, "FAILED") + row(2) + row(5, "FAILED") + row(4, "FAILED");
   EXPECT_EQ(taken(config, config, ""), "nothing");
   EXPECT_EQ(taken(config, config, rows), "1 2 3 4 5 ");
   EXPECT_EQ(taken(config, config, rows + row(5)), "1 2 3 4 5 ");
   EXPECT_EQ(taken(config, config, rows + "6\tOK\t400\t0"), "1 2 3 4 5 ");
   EXPECT_EQ(taken(config, config, rows + row(30) + row(31)), "1 2 3 4 5 30 31 ");
-  config.restart = 2;
+  config.restart = RestartMode::goOnAndRepeatFailed;
   EXPECT_EQ(taken(config, config, rows), "1 2 ");
 
   RunConfig raised = read();
-  raised.restart = 1;
+  raised.restart = RestartMode::goOn;
   EXPECT_EQ(taken(config, raised, rows + row(30) + row(31)), "1 2 3 4 5 30 ");
   const RunConfig tooSmall = read("Max_No_Evaluations = 500 => 19");
   EXPECT_THAT(taken(tooSmall, raised, rows), HasSubstr("only a search whose budget held its initial sample of 20"));
@@ -134,7 +134,7 @@ TEST_F(EarlierRunTest, ARaisedBudgetOfDdsIsAnotherSearch) {
         "Algorithm_Type = 1 => 2 & Include_Initial_Parameters = 1 => 0 & NoSimultaneousSim = 4 => 1 & "
         "Max_No_Evaluations = 500 => " +
         std::to_string(budget));
-    read.restart = 1;
+    read.restart = RestartMode::goOn;
     return read;
   };
   std::string rows;
@@ -151,7 +151,7 @@ TEST_F(EarlierRunTest, ARaisedBudgetOfDdsIsAnotherSearch) {
                {20, 10, {{10, 10}}, {10}}};     // the second search had not begun
   for (const auto& c : cases) {
     RunConfig then = config(c.then);
-    then.optimisation.earlierSearches = c.before;
+    then.task->earlierSearches = c.before;
     std::string some;
     for (int number = 1; number <= c.count; ++number) some += row(number);
     taken(then, config(40), some);

@@ -4,6 +4,7 @@
 #include <gmock/gmock.h>
 
 #include "run/setup_fixture.h"
+#include "run/tasks/optimisation_task.h"
 
 namespace mirevo {
 namespace {
@@ -34,9 +35,10 @@ TEST_F(SetupReaderTest, FillsTheConfigurationOfAnOptimisation) {
   EXPECT_THAT(config.objectives.at(0).measures, ElementsAre(0U));
   EXPECT_FALSE(config.objectives[0].standardDeviation.has_value());
   EXPECT_EQ(config.measureFile, folder_ / "model/measures.txt");
-  EXPECT_EQ(config.optimisation.pse.populationSize, 20);
-  EXPECT_EQ(config.optimisation.simplex.pointCount, 5);
-  EXPECT_EQ(config.randomSeed, -77);
+  const auto& task = dynamic_cast<const OptimisationTask&>(*config.task);
+  EXPECT_EQ(task.method->populationSize(), 20);
+  EXPECT_EQ(task.method->simplex.pointCount, 5);
+  EXPECT_EQ(task.randomSeed, -77);
   EXPECT_EQ(config.simultaneousSimulations, 4);
   EXPECT_EQ(config.plannedEvaluations(), 500);
 }
@@ -124,11 +126,11 @@ TEST_F(SetupReaderTest, EchoesEverySectionAndValueInReadingOrder) {
   const std::string log = logOf("Population_Size = 20 => 0");
   EXPECT_THAT(log, testing::StartsWith("[MIREVO_PARAMETERS]\n"
                                        "[MIREVO_SIMULATION_OPTION]\n"
-                                       "  Option = 2\n"
+                                       "  Option = 2 ('optimisation')\n"
                                        "  Title = 'Upper catchment'\n"
-                                       "  Restart = 0 (default)\n"
+                                       "  Restart = 0 ('no') (default)\n"
                                        "  FailedRunFolders = 3 (default)\n"
-                                       "  Report = 1 (default)\n"
+                                       "  Report = 1 ('yes') (default)\n"
                                        "[MIREVO_SIMULATION_OPTION/SIMBATCH]\n"
                                        "  TqSEKdxListItemCount = 1\n"
                                        "[MIREVO_SIMULATION_OPTION/SIMBATCH/SIMBATCHITEM_1]\n"
@@ -140,8 +142,8 @@ TEST_F(SetupReaderTest, EchoesEverySectionAndValueInReadingOrder) {
                              "  Initial_Value = 7\n"
                              "  Lower_Bound = 6.5\n"
                              "  Upper_Bound = 7.5\n"
-                             "  Transformation_Type = 0 (default)\n"
-                             "  Parameter_Type = 2\n"
+                             "  Transformation_Type = 0 ('none') (default)\n"
+                             "  Parameter_Type = 2 ('dependent')\n"
                              "  Parameter_IDValue = 1.5e-35\n"
                              "  Parameter_Name = 'Sum'\n"
                              "  Parameter_Equation = 'Depth + Rate'\n"

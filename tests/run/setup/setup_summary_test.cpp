@@ -1,7 +1,5 @@
 #include "run/setup/setup_summary.h"
 
-#include <tuple>
-
 #include <gtest/gtest.h>
 
 #include "run/setup_fixture.h"
@@ -46,21 +44,18 @@ TEST_F(SetupSummaryTest, SaysWhatTheRunIsAboutToDo) {
       "Simultaneous simulations: 4");
 }
 
-TEST(TaskName, SaysWhatIsRun) {
-  // The type of scenarios, differences or sampling.
-  for (const auto& [option, type, name] :
-       {std::tuple{0, 0, "Scenario runs: Single run using initial parameter set"},
-        {0, 1, "Scenario runs: Multiple runs"},
-        {1, 0, "Sensitivity analysis: Local sensitivity analysis, forward differences"},
-        {1, 1, "Sensitivity analysis: Local sensitivity analysis, central differences"},
-        {3, 0, "Uncertainty analysis: simple random sampling"},
-        {3, 1, "Uncertainty analysis: Latin hypercube sampling"},
-        {4, 0, "none"}}) {
-    RunConfig config;
-    config.simulationOption = static_cast<SimulationOption>(option);
-    config.scenario.scenarioType = config.sensitivity.local.differencing = config.uncertainty.uncertaintyType = type;
-    EXPECT_EQ(taskName(config), name);
-  }
+TEST_F(SetupSummaryTest, TheTaskSaysWhatIsRun) {
+  const std::pair<const char*, const char*> cases[] = {
+      {"Option = 2 => 0 & Scenario_Type = 1 => 0", "Scenario runs: Single run using initial parameter set"},
+      {"Option = 2 => 0", "Scenario runs: Multiple runs"},
+      {"Option = 2 => 1 & Differencing = 1 => 0",
+       "Sensitivity analysis: Local sensitivity analysis, forward differences"},
+      {"Option = 2 => 1", "Sensitivity analysis: Local sensitivity analysis, central differences"},
+      {"Option = 2 => 3 & Uncertainty_Type = 1 => 0", "Uncertainty analysis: simple random sampling"},
+      {"Option = 2 => 3", "Uncertainty analysis: Latin hypercube sampling"},
+      {"Option = 2 => 4", "none"},
+  };
+  for (const auto& [edits, description] : cases) EXPECT_EQ(read(edits).taskDescription(), description);
 }
 
 }  // namespace

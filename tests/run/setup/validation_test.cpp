@@ -1,7 +1,12 @@
 #include "run/setup/validation.h"
 
+#include <cctype>
+#include <cmath>
+
+#include <fmt/format.h>
 #include <gmock/gmock.h>
 
+#include "run/setup/run_keywords.h"
 #include "run/setup_fixture.h"
 
 namespace mirevo {
@@ -45,38 +50,24 @@ const std::vector<Refused>& refusedValues() {
       {"Upper_Bound = 900 => 412", "Initial parameter value larger than upper bound for parameter Depth",
        "expected 412 or less, found 412.5"},
       {"Lower_Bound = 6.5 => 8.0", "Lower bound larger than upper bound for parameter Sum", "setup.kdx:41:21"},
-      {"Transformation_Type = 1 => 3", "Transformation type invalid for parameter Depth",
-       "setup.kdx:29:29: Transformation_Type: expected 0 to 2, found 3"},
-      {"Parameter_Type = 0 => -1", "Parameter type invalid for parameter Depth", "found -1"},
       {"'Rate'\n    [/P => 'Depth  '\n    [/P", "Invalid parameter name Depth. Name used more than once.",
        "setup.kdx:37:24"},
       {"Lower_Bound = 100 => 0", "Invalid parameter transformation for parameter Depth",
        "greater than 0 for a logarithmic parameter, found 0"},
       {"Parameter_Type = 0 => 1 & Upper_Bound = 1.0 => Upper_Bound = 1.0\nParameter_Type = 1",
        "No variable model parameters defined", "Parameter_Type = 0"},
-      {"Logical_Operator = 1 => 4", "Invalid logical operator in CONSTRAINT_1", "expected 0 to 3, found 4"},
       {"Right_Equation = 'Depth' => ''", "Invalid equation for internal constraints", "Right_Equation"},
       // Measures and objective functions
       {"2001-01-31 => 2001-02-29", "Invalid date 2001 2 29 0 0", "setup.kdx:58:18: Start_Date"},
       {"'2003-12-31 24:00' => 2003-12-31 24:01", "Invalid date 2003 12 31 24 1", "End_Date"},
       {"'2003-12-31 24:00' => 2001-01-30", "End date of the evaluation period before its start date",
        "expected 2001-01-31 00:00 or later, found 2001-01-30 00:00"},
-      {"Aggregation_Method = 0 => 4", "Objective function aggregation method invalid", "found 4"},
-      {"Interface_Type = 0 => 2", "Interface type invalid for output measure Flow error", "Interface_Type"},
-      {"Statistic_Type = 1 => 5", "Statistic type invalid for output measure Flow error", "Statistic_Type"},
-      {"Weight = 1.25 => -1.0E-9", "Weight invalid for output measure Flow error",
-       "Weight: expected 0 or more, found -1e-09"},
-      {"Weight_Above = 2.5 => -2.5", "Weight invalid for output measure Flow error", "Weight_Above: expected"},
       {"MeasurementNo = 3 => 0", "Measurement No. invalid for output measure Written", "expected 1 or more"},
       {"'model/flow.csv' => ''", "No output file defined for output measure No. 1", "setup.kdx:71:23"},
       {"'gauge.csv' => ''", "No observation file defined for output measure No. 1", "File_Name"},
       {"'model/flow.csv' => 'flow.csv'", "The file flow.csv is not located in the base folder ", "File_Name"},
       {"Function_Name = 'Flow' => 'Flwo'", "Invalid function name for output measure Flow error",
        "Function_Name: no objective function is called \"Flwo\""},
-      {"Function_Type = 2 => 3", "Function type invalid for objective function Flow", "found 3"},
-      {"Weight = 0.75 => -0.75", "Weight invalid for objective function Flow", "found -0.75"},
-      {"Weight = 0.75 => Standard_Deviation = 0.0", "Standard deviation invalid for objective function Flow",
-       "greater than 0"},
       {"TqSEKdxListItemCount = 1\n      [OBJECTIVE_1] => 2\n      [OBJECTIVE_1] & [/OBJECTIVE_1] => "
        "[/OBJECTIVE_1][OBJECTIVE_2]\nName = 'Flow'\n[/OBJECTIVE_2]",
        "Invalid objective function name Flow. Name used more than once.", "setup.kdx:95:8"},
@@ -89,7 +80,6 @@ const std::vector<Refused>& refusedValues() {
       {"'model/measures.txt' => '/tmp/measures.txt'", "The file /tmp/measures.txt is not located in the base folder ",
        ""},
       // Tasks
-      {"Option = 2 => 0 & Scenario_Type = 1 => 2", "Invalid scenario type selection", "found 2"},
       {"Option = 2 => 0 & TqSEKdxListItemCount = 1\n      [SCENARIO_1] => 0\n      [SCENARIO_1]",
        "No scenario runs defined", ""},
       {"Option = 2 => 0 & 412.5, 1, 99 => 412.5, 1", "Invalid number of parameter values in SCENARIO_1",
@@ -98,57 +88,26 @@ const std::vector<Refused>& refusedValues() {
        "each of the 3 parameters, found 4"},
       {"Option = 2 => 0 & 412.5, 1, 99 => 412.5, 1.01, 99", "Value for parameter Rate in SCENARIO_1 out of bounds",
        "value 2: expected 0 to 1, found 1.01"},
-      {"Option = 2 => 1 & Sensitivity_Type = 0 => 1", "Invalid sensitivity type selection", "expected 0, found 1"},
-      {"Option = 2 => 1 & Differencing = 1 => 2", "Differencing option in local sensitivity analysis invalid", ""},
-      {"Option = 2 => 1 & Perturbation_Option = 0 => 2", "Perturbation option in local sensitivity analysis invalid",
-       ""},
-      {"Option = 2 => 1 & Perturbation_Fraction = 0.02 => 0",
-       "Perturbation fraction in local sensitivity analysis invalid", "expected greater than 0 and at most 1, found 0"},
       {"Option = 2 => 1 & Perturbation_Fraction = 0.02 => 0.75",
        "Perturbed value for parameter Depth in local sensitivity analysis out of bounds",
        "0.75 of the range, from 412.5, leaves the bounds 100 to 900 both ways (logarithms)"},
-      {"Algorithm_Type = 1 => 3", "Invalid optimisation algorithm type selection", ""},
       {"Upper_Bound = 1.0 => 0.31 & Lower_Bound = 0.0 => 0.31", "Lower bound equal to upper bound for parameter Rate",
        "Parameter_Type = 1 fixes a parameter"},
-      {"Algorithm_Type = 1 => 0 & No_Complexes = 4 => 0", "No. of complexes in SCE algorithm invalid", ""},
-      {"Algorithm_Type = 1 => 0 & No_Points_Complex = 7 => 1", "No. of points in a complex in SCE algorithm invalid",
-       ""},
       {"Algorithm_Type = 1 => 0 & No_Points_Subcomplex = 6 => 8",
        "No. of points in a subcomplex in SCE algorithm invalid", "at most the 7 points of a complex, found 8"},
-      {"Algorithm_Type = 1 => 0 & No_Points_Subcomplex = 6 => 1",
-       "No. of points in a subcomplex in SCE algorithm invalid", "2 or more"},
-      {"Algorithm_Type = 1 => 0 & No_Evaluation_Steps = 8 => 0", "No. of evaluation steps in SCE algorithm invalid",
-       ""},
-      {"Population_Size = 20 => 0", "Population size in PSE algorithm invalid", ""},
       {"No_Points_Simplex = 5 => 21", "No. of points in a simplex in PSE algorithm invalid", "at most the 20 points"},
-      {"Prob_Reflection = 0.6 => 1.1", "Probability for reflection step in PSE algorithm invalid",
-       "expected 0 to 1, found 1.1"},
-      {"Prob_Contraction = 0.4 => -0.1", "Probability for contraction step in PSE algorithm invalid", ""},
       {"Prob_Contraction = 0.4 => 0.5",
        "Sum of probabilities for reflection and contraction in PSE algorithm larger than 1", "found 0.6 + 0.5"},
-      {"Algorithm_Type = 1 => 2 & NoSimultaneousSim = 4 => 1 & Perturbation_Parameter = 0.25 => 1.01",
-       "Perturbation parameter in DDS algorithm invalid", ""},
       {"Algorithm_Type = 1 => 2 & NoSimultaneousSim = 4 => 1 & Max_No_Evaluations = 500 => 0",
        "Maximum No. of model evaluations in DDS algorithm invalid", ""},
-      {"Initial_Sample_Generation = 4 => 5", "Initial sample generation method invalid", ""},
       {"'sample.txt' => '/dev/zero'", "Unable to open /dev/zero", "Not a regular file"},
       {"'sample.txt' => ''", "Unable to open ", "expected the name of a file, found a blank text"},
       {"'sample.txt' => 'none.txt'", "Unable to open none.txt", "No such file"},
-      {"Max_No_Evaluations = 500 => 0", "Maximum No. of model evaluations invalid", ""},
-      {"No_Loops_Convergence = 12 => 0", "No. of loops for evaluation of convergence criterion invalid", ""},
-      {"Min_Change = 0.005 => -0.005", "Minimum change convergence criterion invalid", ""},
-      {"Model_Type = 0 => 2", "Invalid model type for surrogate modelling optimisation", ""},
       {"Neighbourhood_Size = 60 => 5", "Invalid neighbourhood size for surrogate modelling optimisation",
        "at least the 6 coefficients of a quadratic polynomial in 2 parameters, or 0"},
-      {"Sampling_rate = 30 => 101", "Invalid sampling rate for surrogate modelling optimisation", "expected 1 to 100"},
-      {"No_Initial_Generations = 2 => 0", "Invalid no of initial generations for surrogate modelling optimisation", ""},
       {"Neighbourhood_Size = 60 => 61",
        "Population size and/or initial No. of generations too small for surrogate modelling optimisation",
        "Neighbourhood_Size = 61 evaluated sets before the surrogate is fitted, found 60"},
-      {"Option = 2 => 3 & Uncertainty_Type = 1 => 2", "Invalid uncertainty estimation type selection", ""},
-      {"Option = 2 => 3 & Sample_Size = 200 => 1", "Sample size in uncertainty estimation invalid", ""},
-      {"Option = 2 => 3 & Standard_Deviation = 0.3 => 0.0", "Standard deviation in uncertainty estimation invalid", ""},
-      {"NoSimultaneousSim = 4 => 0", "Invalid No. of processes", ""},
       {"Algorithm_Type = 1 => 2", "Use Population Simplex Evolution algorithm for application with multiple processors",
        "found 4"},
       {"Algorithm_Type = 1 => 0", "Use Population Simplex Evolution algorithm for application with multiple processors",
@@ -174,6 +133,156 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
     EXPECT_THAT(error.substr(std::min(error.size(), message.size() + 1)), HasSubstr(row.detail));
     EXPECT_THAT(error, HasSubstr("\nsetup.kdx:")) << "every refusal names its place";
   }
+}
+
+/// A keyword row and the setup in which its section is read.
+struct RowInSetup {
+  const SectionRow* section;
+  const KeywordRow* row;
+  std::string text;  ///< the setup
+};
+
+/// Every keyword of every section that some setup reads.
+std::vector<RowInSetup> rowsInSetups(const std::string& setup) {
+  static const std::pair<std::string_view, const char*> kOptions[] = {
+      {"SCENARIOS", "0"}, {"SENSITIVITY_ANALYSIS", "1"}, {"UNCERTAINTY_ESTIMATION", "3"}};
+  static const std::pair<std::string_view, const char*> kAlgorithms[] = {{"SCE_", "0"}, {"DDS_", "2"}};
+  std::vector<RowInSetup> found;
+  for (const SectionRow* section : setupSchema().sections()) {
+    std::string text = setup;
+    for (const auto& [start, option] : kOptions) {
+      if (section->path.starts_with(start)) {
+        text = SetupFixture::withValue(text, "MIREVO_SIMULATION_OPTION", "Option", option);
+      }
+    }
+    for (const auto& [start, algorithm] : kAlgorithms) {
+      if (section->path.find(start) == std::string_view::npos) continue;
+      text = SetupFixture::withValue(text, "OPTIMISATION_ALGORITHM", "Algorithm_Type", algorithm);
+      text = SetupFixture::withValue(text, "SimultaneousSimulations", "NoSimultaneousSim", "1");
+    }
+    for (const KeywordRow& row : section->keywords) {
+      if (row.store != nullptr) found.push_back({section, &row, text});
+    }
+  }
+  return found;
+}
+
+TEST_F(ValidationTest, RefusesNumbersOutsideTheRangeOfTheirRow) {
+  int checked = 0;
+  for (const RowInSetup& tried : rowsInSetups(edited(""))) {
+    const KeywordFacts& facts = tried.row->facts;
+    if (facts.refusal.empty()) continue;
+    const bool isReal = tried.row->type == KeywordType::real;
+    const double below = facts.range.lowestExcluded ? facts.range.lowest : facts.range.lowest - (isReal ? 1e-9 : 1);
+    for (const double value : {below, facts.range.highest + (isReal ? 1e-6 : 1)}) {
+      if (!std::isfinite(value)) continue;
+      SCOPED_TRACE(fmt::format("{} {} = {}", tried.section->path, facts.name, value));
+      const std::string number = isReal ? fmt::format("{:.12g}", value) : fmt::format("{:.0f}", value);
+      const std::string error = failureOf(withValue(tried.text, tried.section->path, facts.name, number));
+      EXPECT_THAT(error, StartsWith(std::string(facts.refusal)));
+      EXPECT_THAT(error, HasSubstr(fmt::format("{}: expected {}, found ", facts.name, facts.range.text())));
+      EXPECT_THAT(error, HasSubstr("\nsetup.kdx:")) << "every refusal names its location";
+      ++checked;
+    }
+  }
+  EXPECT_GT(checked, 60);
+}
+
+// The fixed texts, by one value each: the rows above are held to themselves.
+TEST_F(ValidationTest, RefusesWithTheTextsThatUsersKnow) {
+  const struct {
+    const char* edits;
+    const char* error;
+  } cases[] = {
+      {"Transformation_Type = 1 => 3",
+       "Transformation type invalid for parameter Depth\nsetup.kdx:29:29: Transformation_Type: expected 0 to 2, found "
+       "3"},
+      {"Parameter_Type = 0 => -1", "Parameter type invalid for parameter Depth\n"},
+      {"Logical_Operator = 1 => 4", "Invalid logical operator in CONSTRAINT_1\n"},
+      {"Aggregation_Method = 0 => 4", "Objective function aggregation method invalid\n"},
+      {"Interface_Type = 0 => 2", "Interface type invalid for output measure Flow error\n"},
+      {"Statistic_Type = 1 => 5", "Statistic type invalid for output measure Flow error\n"},
+      {"Weight_Above = 2.5 => -2.5", "Weight invalid for output measure Flow error\nsetup.kdx:68:24: Weight_Above: "},
+      {"Function_Type = 2 => 3", "Function type invalid for objective function Flow\n"},
+      {"Weight = 0.75 => -0.75", "Weight invalid for objective function Flow\n"},
+      {"Option = 2 => 0 & Scenario_Type = 1 => 2", "Invalid scenario type selection\n"},
+      {"Option = 2 => 1 & Sensitivity_Type = 0 => 1", "Invalid sensitivity type selection\n"},
+      {"Option = 2 => 1 & Differencing = 1 => 2", "Differencing option in local sensitivity analysis invalid\n"},
+      {"Option = 2 => 1 & Perturbation_Option = 0 => 2", "Perturbation option in local sensitivity analysis invalid\n"},
+      {"Option = 2 => 1 & Perturbation_Fraction = 0.02 => 0",
+       "Perturbation fraction in local sensitivity analysis invalid\n"},
+      {"Algorithm_Type = 1 => 3", "Invalid optimisation algorithm type selection\n"},
+      {"Algorithm_Type = 1 => 0 & No_Complexes = 4 => 0", "No. of complexes in SCE algorithm invalid\n"},
+      {"Algorithm_Type = 1 => 0 & No_Points_Complex = 7 => 1", "No. of points in a complex in SCE algorithm invalid\n"},
+      {"Algorithm_Type = 1 => 0 & No_Points_Subcomplex = 6 => 1",
+       "No. of points in a subcomplex in SCE algorithm invalid\n"},
+      {"Algorithm_Type = 1 => 0 & No_Evaluation_Steps = 8 => 0", "No. of evaluation steps in SCE algorithm invalid\n"},
+      {"Population_Size = 20 => 0", "Population size in PSE algorithm invalid\n"},
+      {"No_Points_Simplex = 5 => 1", "No. of points in a simplex in PSE algorithm invalid\n"},
+      {"Prob_Reflection = 0.6 => 1.1", "Probability for reflection step in PSE algorithm invalid\n"},
+      {"Prob_Contraction = 0.4 => -0.1", "Probability for contraction step in PSE algorithm invalid\n"},
+      {"Algorithm_Type = 1 => 2 & NoSimultaneousSim = 4 => 1 & Perturbation_Parameter = 0.25 => 1.01",
+       "Perturbation parameter in DDS algorithm invalid\n"},
+      {"Initial_Sample_Generation = 4 => 5", "Initial sample generation method invalid\n"},
+      {"Max_No_Evaluations = 500 => 0", "Maximum No. of model evaluations invalid\n"},
+      {"No_Loops_Convergence = 12 => 0", "No. of loops for evaluation of convergence criterion invalid\n"},
+      {"Min_Change = 0.005 => -0.005", "Minimum change convergence criterion invalid\n"},
+      {"Model_Type = 0 => 2", "Invalid model type for surrogate modelling optimisation\n"},
+      {"Neighbourhood_Size = 60 => -1", "Invalid neighbourhood size for surrogate modelling optimisation\n"},
+      {"Sampling_rate = 30 => 101", "Invalid sampling rate for surrogate modelling optimisation\n"},
+      {"No_Initial_Generations = 2 => 0", "Invalid no of initial generations for surrogate modelling optimisation\n"},
+      {"Option = 2 => 3 & Uncertainty_Type = 1 => 2", "Invalid uncertainty estimation type selection\n"},
+      {"Option = 2 => 3 & Sample_Size = 200 => 1", "Sample size in uncertainty estimation invalid\n"},
+      {"Option = 2 => 3 & Standard_Deviation = 0.3 => 0.0", "Standard deviation in uncertainty estimation invalid\n"},
+      {"NoSimultaneousSim = 4 => 0", "Invalid No. of processes\n"},
+  };
+  for (const auto& row : cases) EXPECT_THAT(failure(row.edits), StartsWith(std::string("Error: ") + row.error));
+}
+
+TEST_F(ValidationTest, CodesAreTakenByNumberOrByName) {
+  const auto resultsOf = [this](const std::string& text) {
+    RunLog log;
+    std::string settings;
+    for (const ResultSetting& one : readSetup(folder_ / "setup.kdx", text, log).resultSettings) {
+      settings += one.section + " " + one.keyword + " = " + one.value + "\n";
+    }
+    return settings;
+  };
+  int compared = 0;
+  for (const RowInSetup& tried : rowsInSetups(edited(""))) {
+    if (tried.row->type != KeywordType::code) continue;
+    SCOPED_TRACE(std::string(tried.section->path) + " " + std::string(tried.row->name()));
+    for (const CodeName& code : tried.row->facts.codes) {
+      std::string shouted = "' ";
+      for (const char c : code.name) shouted += static_cast<char>(std::toupper(static_cast<unsigned char>(c)));
+      const std::string byName = withValue(tried.text, tried.section->path, tried.row->name(), shouted + " '");
+      if (!code.code) {
+        EXPECT_EQ(failureOf(byName), "");
+        continue;
+      }
+      const std::string byNumber =
+          withValue(tried.text, tried.section->path, tried.row->name(), std::to_string(*code.code));
+      const std::string error = failureOf(byNumber);
+      const auto withoutColumn = [](std::string text) { return text.substr(0, text.find('\n')); };
+      EXPECT_EQ(withoutColumn(failureOf(byName)), withoutColumn(error));
+      if (error.empty()) {
+        EXPECT_EQ(resultsOf(byName), resultsOf(byNumber));
+        ++compared;
+      }
+    }
+    const std::string error = failureOf(withValue(tried.text, tried.section->path, tried.row->name(), "'nonesuch'"));
+    const std::string_view section = tried.section->path;
+    EXPECT_THAT(error, StartsWith("Error: Unable to read keyword in section "));
+    EXPECT_THAT(error, HasSubstr(fmt::format("{}: expected an integer within 32 bits or one of the names '{}'",
+                                             tried.row->name(), tried.row->facts.codes.front().name)))
+        << section;
+  }
+  EXPECT_GT(compared, 40);
+  EXPECT_THAT(failure("Option = 2 => 'optimsation'"),
+              HasSubstr("setup.kdx:3:14: Option: expected an integer within 32 bits or one of the names 'scenarios', "
+                        "'sensitivity', 'optimisation', 'uncertainty', found the text \"optimsation\", did you mean "
+                        "'optimisation'?"));
+  EXPECT_THAT(logOf("Algorithm_Type = 1 => 'pse'"), HasSubstr("  Algorithm_Type = 1 ('PSE')\n"));
 }
 
 TEST_F(ValidationTest, AcceptsTheValuesAtTheEdgeOfWhatIsValid) {

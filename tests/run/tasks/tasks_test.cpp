@@ -6,8 +6,10 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "algorithms/searches/optimisation_driver.h"
 #include "refusal.h"
+#include "run/tasks/optimisation_task.h"
+#include "run/tasks/scenario_task.h"
+#include "run/tasks/sensitivity_task.h"
 
 namespace mirevo {
 namespace {
@@ -48,26 +50,24 @@ ModelParameter parameter(const char* name, ParameterType type, TransformationTyp
 
 class TasksTest : public ::testing::Test {
  protected:
-  TasksTest() {
-    config_.parameters = {parameter("a", ParameterType::variable, TransformationType::none),
-                          parameter("b", ParameterType::fixed, TransformationType::none),
-                          parameter("c", ParameterType::variable, TransformationType::logarithmic),
-                          parameter("d", ParameterType::variable, TransformationType::integer)};
-    config_.objectives.resize(1);
-    space_ = BuildSearchSpace(config_.parameters);
+  std::string run(Task& task) {
+    return task.run({space_, parameters_, {}, objectives_, evaluator_, log_}).terminationMessage;
   }
-  std::string run() { return runTask({config_, space_, evaluator_, log_}).terminationMessage; }
 
-  RunConfig config_;
-  SearchSpace space_;
+  std::vector<ModelParameter> parameters_{parameter("a", ParameterType::variable, TransformationType::none),
+                                          parameter("b", ParameterType::fixed, TransformationType::none),
+                                          parameter("c", ParameterType::variable, TransformationType::logarithmic),
+                                          parameter("d", ParameterType::variable, TransformationType::integer)};
+  std::vector<ObjectiveFunction> objectives_{1};
+  SearchSpace space_ = BuildSearchSpace(parameters_);
   RecordingEvaluator evaluator_;
   RunLog log_;
 };
 
 TEST_F(TasksTest, MultipleRunsAreOneBatchAndComeBackToTheirModelValues) {
-  config_.scenario.scenarioType = 1;
-  config_.scenario.runs = {{0.1, 7.0, 2.0, 3.7}, {-4.0, 7.0, 412.5, 2.5}};
-  run();
+  ScenarioTask task;
+  task.settings = {ScenarioType::multipleRuns, {{{0.1, 7.0, 2.0, 3.7}}, {{-4.0, 7.0, 412.5, 2.5}}}};
+  run(task);
   ASSERT_EQ(evaluator_.batches.size(), 1U);
   ASSERT_EQ(evaluator_.batches[0].size(), 2U);
   EXPECT_THAT(ToModelScale(space_, evaluator_.batches[0][0]), ElementsAre(0.1, DoubleEq(2.0), 3.5));
@@ -75,65 +75,54 @@ TEST_F(TasksTest, MultipleRunsAreOneBatchAndComeBackToTheirModelValues) {
 }
 
 TEST_F(TasksTest, AScenarioValueWithoutALogarithmIsRefusedByRunAndParameter) {
-  config_.scenario.scenarioType = 1;
-  config_.scenario.runs = {{1.0, 1.0, 1.0, 1.0}, {1.0, 1.0, 0.0, 1.0}};
-  EXPECT_EQ(refusalOf([this] { run(); }),
+  ScenarioTask task;
+  task.settings = {ScenarioType::multipleRuns, {{{1.0, 1.0, 1.0, 1.0}}, {{1.0, 1.0, 0.0, 1.0}}}};
+  EXPECT_EQ(refusalOf([&] { run(task); }),
             "Error: Invalid parameter transformation for parameter c\n"
             "Scenario run 2 has the value 0, which has no logarithm.");
   EXPECT_TRUE(evaluator_.batches.empty());
 }
 
-TEST_F(TasksTest, ATaskThatDoesNotExistRunsNothingAndEndsNormally) {
-  config_.simulationOption = static_cast<SimulationOption>(7);
-  EXPECT_EQ(run(), "Normal termination");
-  config_.simulationOption = SimulationOption::sensitivityAnalysis;
-  config_.sensitivity.sensitivityType = 1;
-  EXPECT_EQ(run(), "Normal termination");
-  config_.simulationOption = SimulationOption::parameterOptimisation;
-  config_.optimisation.useSurrogateModel = 2;
-  EXPECT_EQ(run(), "Normal termination");
+TEST_F(TasksTest, WhatDoesNotExistRunsNothingAndEndsNormally) {
+  SensitivityTask sensitivity;
+  sensitivity.type = SensitivityType{1};
+  EXPECT_EQ(run(sensitivity), "Normal termination");
+  OptimisationTask optimisation;
+  EXPECT_EQ(run(optimisation), "Normal termination") << "no search has the number";
+  optimisation.method = makeSearchMethod(SetupValue(2));
+  optimisation.surrogateUse = SurrogateUse{2};
+  EXPECT_EQ(run(optimisation), "Normal termination");
   EXPECT_TRUE(evaluator_.batches.empty());
 }
 
 TEST_F(TasksTest, AfterEverySearchItsBestSetIsTheFinalModelRun) {
-  const struct {
-    AlgorithmType algorithm;
-    std::int32_t surrogate;
-  } cases[] = {{AlgorithmType::dds, 0}, {AlgorithmType::dds, 1}, {AlgorithmType::sce, 0},
-               {AlgorithmType::sce, 1}, {AlgorithmType::pse, 0}, {AlgorithmType::pse, 1}};
-  config_.simulationOption = SimulationOption::parameterOptimisation;
-  config_.optimisation.stopping.maxEvaluations = 90;
-  config_.optimisation.stopping.minChange = 0.0;
-  config_.optimisation.surrogate.neighbourhoodSize = 20;
-  config_.optimisation.surrogate.initialGenerations = 1;
-  for (const auto& c : cases) {
-    SCOPED_TRACE(testing::Message() << static_cast<int>(c.algorithm) << " " << c.surrogate);
-    config_.optimisation.algorithmType = c.algorithm;
-    config_.optimisation.useSurrogateModel = c.surrogate;
-    evaluator_.batches.clear();
-    EXPECT_EQ(run(), "Optimisation terminated: Maximum number of model evaluations reached");
-    ASSERT_GT(evaluator_.batches.size(), 2U);
-    const std::vector<ParameterSet> last = evaluator_.batches.back();
-    ASSERT_EQ(last.size(), 1U);
-    std::size_t evaluations = 0;
-    double best = last[0].front();
-    for (const auto& batch : evaluator_.batches) {
-      evaluations += batch.size();
-      for (const ParameterSet& set : batch) best = std::min(best, set.front());
+  for (const CodeName& name : searchNames()) {
+    std::vector<std::vector<ParameterSet>> alone;
+    for (const SurrogateUse use : {SurrogateUse::no, SurrogateUse::yes}) {
+      SCOPED_TRACE(testing::Message() << name.name << " " << static_cast<int>(use));
+      OptimisationTask task;
+      task.method = makeSearchMethod(SetupValue(std::string(name.name)));
+      task.surrogateUse = use;
+      task.stopping = {.maxEvaluations = 90, .minChange = 0.0};
+      task.surrogate.neighbourhoodSize = 20;
+      evaluator_.batches.clear();
+      EXPECT_EQ(run(task), "Optimisation terminated: Maximum number of model evaluations reached");
+      ASSERT_GT(evaluator_.batches.size(), 2U);
+      const std::vector<ParameterSet> last = evaluator_.batches.back();
+      ASSERT_EQ(last.size(), 1U);
+      std::size_t evaluations = 0;
+      double best = last[0].front();
+      for (const auto& batch : evaluator_.batches) {
+        evaluations += batch.size();
+        for (const ParameterSet& set : batch) best = std::min(best, set.front());
+      }
+      EXPECT_EQ(last[0].front(), best);
+      EXPECT_EQ(evaluations, 91U) << "the budget and the final model run";
+      if (use == SurrogateUse::no) alone = evaluator_.batches;
+      if (task.method->facts().usesSurrogate) continue;
+      EXPECT_EQ(evaluator_.batches, alone) << "a search that uses no surrogate model runs as it does alone";
     }
-    EXPECT_EQ(last[0].front(), best);
-    EXPECT_EQ(evaluations, 91U) << "the budget and the final model run";
   }
-}
-
-TEST_F(TasksTest, DynamicallyDimensionedSearchRunsWithoutTheSurrogateModelThatIsAskedFor) {
-  config_.simulationOption = SimulationOption::parameterOptimisation;
-  config_.optimisation.stopping.maxEvaluations = 20;
-  const std::string plain = run();
-  const auto batches = std::exchange(evaluator_.batches, {});
-  config_.optimisation.useSurrogateModel = 1;
-  EXPECT_EQ(run(), plain);
-  EXPECT_EQ(evaluator_.batches, batches);
 }
 
 /// Fails at a chosen step.

@@ -1,5 +1,6 @@
-#include "run/setup/setup_value.h"
+#include "run/access/setup_value.h"
 
+#include <algorithm>
 #include <cassert>
 
 #include <fmt/format.h>
@@ -20,6 +21,7 @@ using Converted = std::variant<SetupValue, SetupValueError>;
 std::string_view wanted(KeywordType type) {
   switch (type) {
     case KeywordType::integer:
+    case KeywordType::code:
       return "an integer within 32 bits";
     case KeywordType::real:
     case KeywordType::realList:
@@ -97,8 +99,34 @@ Converted convertList(const KdxKeyword& keyword) {
   return SetupValue(std::move(list));
 }
 
-Converted convertOne(KeywordType type, const KdxValue& value) {
+/// A number is taken whatever it is: what it means, and whether it means anything, is for the keyword to say.
+Converted convertCode(std::span<const CodeName> codes, const KdxValue& value) {
+  if (const auto* integer = std::get_if<std::int32_t>(&value.value)) return SetupValue(*integer);
+  const auto* text = std::get_if<std::string>(&value.value);
+  if (text == nullptr) return mismatch(KeywordType::code, value);
+  const std::string_view name = trim(*text);
+  for (const CodeName& code : codes) {
+    if (!equalIgnoringCase(code.name, name)) continue;
+    if (code.code) return SetupValue(*code.code);
+    return SetupValue(std::string(code.name));
+  }
+  std::vector<std::string> names;
+  std::string known;
+  for (const CodeName& code : codes) {
+    names.emplace_back(code.name);
+    known += (known.empty() ? "'" : ", '") + names.back() + "'";
+  }
+  const auto nearest = nearestName(name, names);
+  return SetupValueError{value.position,
+                         fmt::format("expected {} or one of the names {}, found {}{}", wanted(KeywordType::code), known,
+                                     found(value), nearest ? fmt::format(", did you mean '{}'?", *nearest) : "")};
+}
+
+Converted convertOne(const KeywordRow& row, const KdxValue& value) {
+  const KeywordType type = row.type;
   switch (type) {
+    case KeywordType::code:
+      return convertCode(row.facts.codes, value);
     case KeywordType::integer:
       if (const auto* integer = std::get_if<std::int32_t>(&value.value)) return SetupValue(*integer);
       return mismatch(type, value);
@@ -132,14 +160,14 @@ Converted convertSetupValue(const KeywordRow& row, const KdxKeyword& keyword) {
     return SetupValueError{keyword.values.size() > 1 ? keyword.values[1].position : keyword.position,
                            fmt::format("expected one value, found {}", keyword.values.size())};
   }
-  return convertOne(row.type, keyword.values.front());
+  return convertOne(row, keyword.values.front());
 }
 
 SetupValue defaultSetupValue(const KeywordRow& row) {
-  KdxCursor cursor(row.defaultValue);
+  KdxCursor cursor(row.facts.defaultValue);
   const auto value = readKdxValue(cursor, '=');
   assert(std::holds_alternative<KdxValue>(value));
-  const auto converted = convertOne(row.type, std::get<KdxValue>(value));
+  const auto converted = convertOne(row, std::get<KdxValue>(value));
   assert(std::holds_alternative<SetupValue>(converted));
   return std::get<SetupValue>(converted);
 }

@@ -1,4 +1,4 @@
-#include "run/setup/setup_access.h"
+#include "run/access/setup_access.h"
 
 #include <algorithm>
 #include <filesystem>
@@ -8,7 +8,7 @@
 
 #include "common/fatal_error.h"
 #include "common/text.h"
-#include "run/setup/setup_value.h"
+#include "run/access/setup_value.h"
 
 namespace mirevo {
 namespace {
@@ -22,7 +22,7 @@ KdxDocument parsed(const std::string& fileName, std::string_view text) {
   return std::get<KdxDocument>(std::move(result));
 }
 
-/// What a missing name may have been misspelt as: the nearest of the names that stand there and mean nothing.
+/// What a missing name may have been misspelt as: the nearest of the names that are there and mean nothing.
 std::string didYouMean(std::string_view missing, const std::vector<std::string>& unknown) {
   const auto nearest = nearestName(missing, unknown);
   return nearest ? fmt::format("; found {}, did you mean {}?", quotedForMessage(*nearest), quotedForMessage(missing))
@@ -35,8 +35,9 @@ std::string inside(std::string_view path, std::string_view name) {
 
 }  // namespace
 
-SetupFile::SetupFile(const std::string& fileName, std::string folder, std::string_view text, RunLog& log)
-    : document_(parsed(fileName, text)), folder_(std::move(folder)), log_(log) {}
+SetupFile::SetupFile(const std::string& fileName, std::string folder, std::string_view text, const SetupSchema& schema,
+                     RunLog& log)
+    : document_(parsed(fileName, text)), folder_(std::move(folder)), schema_(schema), log_(log) {}
 
 SetupSection SetupFile::target() {
   const SetupSection root(*this, document_.root, "", "");
@@ -44,7 +45,7 @@ SetupSection SetupFile::target() {
   return {*this, *document_.root.section(kSetupTarget), "", ""};
 }
 
-std::string SetupFile::place(KdxPosition position) const {
+std::string SetupFile::location(KdxPosition position) const {
   if (position.line == 0) return document_.sourceName;  // the file as a whole
   return fmt::format("{}:{}:{}", document_.sourceName, position.line, position.column);
 }
@@ -81,11 +82,12 @@ SetupSection SetupSection::open(std::string_view name) const {
   if (auto section = openIfPresent(name)) return *std::move(section);
   std::vector<std::string> unknown;
   for (const auto& section : node_->sections()) {
-    if (findSection(inside(pattern_, itemPattern(section->name()))) == nullptr) unknown.push_back(section->name());
+    const std::string path = inside(pattern_, itemPattern(section->name()));
+    if (file_->schema().findSection(path) == nullptr) unknown.push_back(section->name());
   }
   const std::string where = node_->name().empty() ? std::string("in the file") : "in section " + node_->name();
   fatalError(fmt::format("Error: Unable to open section {} in KDX file", name),
-             fmt::format("{}: expected section [{}] {}{}", file_->place(node_->position()), name, where,
+             fmt::format("{}: expected section [{}] {}{}", file_->location(node_->position()), name, where,
                          didYouMean(name, unknown)));
 }
 
@@ -97,52 +99,86 @@ std::string SetupSection::name() const {
   return node_->name();
 }
 
-void SetupSection::read(RunConfig& config, std::size_t item) const {
-  for (const KeywordRow& row : keywordsOf(pattern_)) {
-    if (row.store != nullptr) readRow(row, config, item);
+void SetupSection::read(const BoundSection& section) const {
+  take(section);
+  check(section);
+}
+
+void SetupSection::take(const BoundSection& section) const {
+  for (const KeywordRow& row : section.row->keywords) {
+    if (row.store != nullptr) takeRow(row, section.settings);
   }
 }
 
-void SetupSection::readRow(const KeywordRow& row, RunConfig& config, std::size_t item) const {
+void SetupSection::takeRow(const KeywordRow& row, void* settings) const {
   const bool isList = row.type == KeywordType::textLines;
-  const int count = isList ? node_->keywordCount(row.name) : std::min(1, node_->keywordCount(row.name));
+  const int count = isList ? node_->keywordCount(row.name()) : std::min(1, node_->keywordCount(row.name()));
   for (int instance = 1; instance <= count; ++instance) {
-    take(row, convert(row, *node_->keyword(row.name, instance)), false, config, item);
+    takeValue(row, convert(row, *node_->keyword(row.name(), instance)), false, settings);
   }
   if (count > 0 || isList || row.isLeftOutByDefault()) return;
   if (row.isRequired()) refuseMissing(row);
-  take(row, defaultSetupValue(row), true, config, item);
+  takeValue(row, defaultSetupValue(row), true, settings);
 }
 
-void SetupSection::take(const KeywordRow& row, const SetupValue& value, bool isDefault, RunConfig& config,
-                        std::size_t item) const {
-  echo(row.name, value, isDefault);
-  row.store(config, item, value);
-  if (!row.bearsOnResults) return;
+void SetupSection::takeValue(const KeywordRow& row, const SetupValue& value, bool isDefault, void* settings) const {
+  echo(row, value, isDefault);
+  row.store(settings, value);
+  if (!row.facts.bearsOnResults) return;
   const bool isFile = row.type == KeywordType::fileName;
-  config.resultSettings.push_back({path_, std::string(row.name),
-                                   isFile ? file_->relative(std::get<std::string>(value)) : formatSetupValue(value),
-                                   isDefault});
+  file_->resultSettings().push_back({path_, std::string(row.name()),
+                                     isFile ? file_->relative(std::get<std::string>(value)) : formatSetupValue(value),
+                                     isDefault});
+}
+
+void SetupSection::check(const BoundSection& section) const {
+  std::vector<const KeywordRow*> rows;
+  for (const KeywordRow& row : section.row->keywords) {
+    if (row.store != nullptr && (!row.facts.refusal.empty() || row.check != nullptr)) rows.push_back(&row);
+  }
+  std::stable_sort(rows.begin(), rows.end(),
+                   [](const KeywordRow* a, const KeywordRow* b) { return a->facts.checkOrder < b->facts.checkOrder; });
+  for (const KeywordRow* row : rows) {
+    if (!row->facts.refusal.empty()) checkRange(*row, section);
+    if (row->check != nullptr) require(row->check(section.settings));
+  }
+}
+
+void SetupSection::checkRange(const KeywordRow& row, const BoundSection& section) const {
+  const KdxKeyword* keyword = node_->keyword(row.name());
+  if (keyword == nullptr) return;  // a default is valid
+  const SetupValue value = convert(row, *keyword);
+  const auto* integer = std::get_if<std::int32_t>(&value);
+  const auto* real = std::get_if<double>(&value);
+  if (integer == nullptr && real == nullptr) return;  // a code's name
+  const double number = integer != nullptr ? *integer : *real;
+  if (row.facts.range.contains(number)) return;
+  std::string message(row.facts.refusal);
+  if (message.ends_with(' ')) {
+    message += section.row->itemName != nullptr ? section.row->itemName(section.settings) : name();
+  }
+  refuse(message, row.name(), fmt::format("expected {}, found {}", row.facts.range.text(), formatReal(number)));
 }
 
 std::size_t SetupSection::readCount(std::string_view itemPrefix) const {
-  const KeywordRow& row = *findKeyword(pattern_, kItemCountKeyword);
+  const KeywordRow& row = *file_->schema().findKeyword(pattern_, kItemCountKeyword);
   std::size_t present = 0;
   for (const auto& section : node_->sections()) {
     const bool isItem = section->name().starts_with(itemPrefix) && itemPattern(section->name()) != section->name();
     present += isItem ? 1 : 0;
   }
-  const KdxKeyword* keyword = node_->keyword(row.name);
+  const KdxKeyword* keyword = node_->keyword(row.name());
   if (keyword == nullptr) {
     if (present > 0) refuseMissing(row);  // items that would be left out without a word
-    echo(row.name, SetupValue(std::int32_t{0}), true);
+    echo(row, SetupValue(std::int32_t{0}), true);
     return 0;
   }
   const auto count = std::get<std::int32_t>(convert(row, *keyword));
-  echo(row.name, SetupValue(count), false);
-  if (count < 0) refuseToRead(keyword->position, row.name, fmt::format("expected 0 or more, found {}", count));
+  echo(row, SetupValue(count), false);
+  if (count < 0) refuseToRead(keyword->position, row.name(), fmt::format("expected 0 or more, found {}", count));
   if (present > static_cast<std::size_t>(count)) {
-    warn(row.name, fmt::format("{} sections {}n stand here, those beyond {} are not read", present, itemPrefix, count));
+    warn(row.name(),
+         fmt::format("{} sections {}n stand here, those beyond {} are not read", present, itemPrefix, count));
   }
   return static_cast<std::size_t>(count);
 }
@@ -150,26 +186,23 @@ std::size_t SetupSection::readCount(std::string_view itemPrefix) const {
 SetupValue SetupSection::convert(const KeywordRow& row, const KdxKeyword& keyword) const {
   auto converted = convertSetupValue(row, keyword);
   if (const auto* error = std::get_if<SetupValueError>(&converted)) {
-    refuseToRead(error->position, row.name, error->explanation);
+    refuseToRead(error->position, row.name(), error->explanation);
   }
   SetupValue value = std::get<SetupValue>(std::move(converted));
   if (row.type == KeywordType::fileName) return file_->resolve(std::get<std::string>(value));
   return value;
 }
 
-void SetupSection::check(std::string_view keyword, double value, std::string_view message) const {
-  const KeywordRow& row = *findKeyword(pattern_, keyword);
-  if (!row.range.contains(value)) {
-    refuse(message, keyword, fmt::format("expected {}, found {}", row.range.text(), formatReal(value)));
-  }
+void SetupSection::refuse(std::string_view message, std::string_view keyword, std::string_view explanation) const {
+  fatalError(message, fmt::format("{}: {}: {}", location(keyword), keyword, explanation));
 }
 
-void SetupSection::refuse(std::string_view message, std::string_view keyword, std::string_view explanation) const {
-  fatalError(message, fmt::format("{}: {}: {}", place(keyword), keyword, explanation));
+void SetupSection::refuse(const SettingRefusal& refusal) const {
+  refuse(refusal.message, refusal.keyword, refusal.explanation);
 }
 
 void SetupSection::warn(std::string_view keyword, std::string_view text) const {
-  file_->log().warning(fmt::format("{}: {}: {}", place(keyword), keyword, text));
+  file_->log().warning(fmt::format("{}: {}: {}", location(keyword), keyword, text));
 }
 
 void SetupSection::note(std::string_view keyword, std::string_view text) const {
@@ -183,27 +216,31 @@ std::string SetupSection::written(std::string_view keyword) const {
 }
 
 /// Of the keyword's first value; of the section where the keyword is absent.
-std::string SetupSection::place(std::string_view keyword) const {
+std::string SetupSection::location(std::string_view keyword) const {
   const KdxKeyword* found = node_->keyword(keyword);
-  return file_->place(found == nullptr ? node_->position() : found->values.front().position);
+  return file_->location(found == nullptr ? node_->position() : found->values.front().position);
 }
 
 void SetupSection::refuseMissing(const KeywordRow& row) const {
   std::vector<std::string> unknown;
   for (const KdxKeyword& keyword : node_->keywords()) {
-    if (findKeyword(pattern_, keyword.name) == nullptr) unknown.push_back(keyword.name);
+    if (file_->schema().findKeyword(pattern_, keyword.name) == nullptr) unknown.push_back(keyword.name);
   }
-  refuseToRead(node_->position(), row.name,
-               fmt::format("the keyword is missing in section {}{}", path_, didYouMean(row.name, unknown)));
+  refuseToRead(node_->position(), row.name(),
+               fmt::format("the keyword is missing in section {}{}", path_, didYouMean(row.name(), unknown)));
 }
 
 void SetupSection::refuseToRead(KdxPosition position, std::string_view keyword, std::string_view explanation) const {
   fatalError(fmt::format("Error: Unable to read keyword in section {} in KDX file", name()),
-             fmt::format("{}: {}: {}", file_->place(position), keyword, explanation));
+             fmt::format("{}: {}: {}", file_->location(position), keyword, explanation));
 }
 
-void SetupSection::echo(std::string_view keyword, const SetupValue& value, bool isDefault) const {
-  file_->log().line(fmt::format("  {} = {}{}", keyword, formatSetupValue(value), isDefault ? " (default)" : ""));
+void SetupSection::echo(const KeywordRow& row, const SetupValue& value, bool isDefault) const {
+  const std::string_view name =
+      std::holds_alternative<std::int32_t>(value) ? nameOfCode(row.facts.codes, value) : std::string_view{};
+  file_->log().line(fmt::format("  {} = {}{}{}", row.name(), formatSetupValue(value),
+                                name.empty() ? std::string{} : fmt::format(" ('{}')", name),
+                                isDefault ? " (default)" : ""));
 }
 
 }  // namespace mirevo

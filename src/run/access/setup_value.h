@@ -2,9 +2,10 @@
 
 #include <optional>
 #include <string>
+#include <variant>
 
+#include "common/settings/keyword_row.h"
 #include "platform/kdx/kdx.h"
-#include "run/setup/keyword_table.h"
 
 namespace mirevo {
 
@@ -15,7 +16,8 @@ struct SetupValueError {
 };
 
 /// The values of a keyword as the value that its row asks for. An integer is taken where a real is wanted and a text
-/// that has the form of a date where a date is, nothing else is turned into another type. Texts lose trailing blanks.
+/// that has the form of a date where a date is, nothing else is turned into another type. Texts lose trailing blanks. A
+/// name of a coded keyword becomes its number where it has one.
 std::variant<SetupValue, SetupValueError> convertSetupValue(const KeywordRow& row, const KdxKeyword& keyword);
 
 /// The default of a row that has one.

@@ -1,8 +1,8 @@
+#include "run/access/file_validation.h"
+
 #include <fmt/format.h>
 
-#include "common/fatal_error.h"
 #include "common/files.h"
-#include "run/setup/validation.h"
 
 namespace mirevo {
 namespace {

@@ -1,0 +1,28 @@
+#include "algorithms/searches/population_method.h"
+
+#include <fmt/format.h>
+
+namespace mirevo {
+
+bool PopulationMethod::evaluatesSample(const InitialSampleSettings& /*sample*/) const {
+  return true;
+}
+
+RaisedBudget PopulationMethod::raiseBudget(const SearchHistory& history, const StoppingCriteria& stopping,
+                                           const InitialSampleSettings& /*sample*/) const {
+  RaisedBudget raised;
+  if (history.budget < populationSize()) {
+    raised.refusal = fmt::format(
+        "Max_No_Evaluations: {} then, {} now: only a search whose budget held its initial sample of {} "
+        "sets can be taken further",
+        history.budget, stopping.maxEvaluations, populationSize());
+    return raised;
+  }
+  // What lies beyond the earlier budget is the final model run of the search that used it up.
+  raised.keptEvaluations = history.budget;
+  raised.note = fmt::format("Max_No_Evaluations was raised from {} to {}: the search goes on where it ended",
+                            history.budget, stopping.maxEvaluations);
+  return raised;
+}
+
+}  // namespace mirevo

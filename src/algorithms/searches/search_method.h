@@ -1,0 +1,101 @@
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <functional>
+#include <limits>
+#include <memory>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "algorithms/searches/initial_sample.h"
+#include "algorithms/searches/optimisation_driver.h"
+#include "algorithms/searches/search_problem.h"
+#include "common/settings/keyword_row.h"
+
+namespace mirevo {
+
+/// Number of points in a simplex: SCE's subcomplex and PSE's simplex are one setting.
+struct SimplexSettings {
+  std::int32_t pointCount = 2;
+};
+
+/// What is always true of a search, whatever its settings.
+struct SearchFacts {
+  CodeName name;                    ///< in setups; the name is also that of messages and reports: "SCE"
+  std::string_view longName;        ///< "Shuffled Complex Evolution"
+  bool runsInParallel = false;      ///< its batches fill several slots
+  bool usesSurrogate = false;       ///< a surrogate model can choose among its proposals
+  bool drawsInitialSample = false;  ///< it begins with the sample that the section INITIAL_SAMPLE describes
+};
+
+/// A keyword whose value is small for the number of variable parameters: the search may end early.
+struct SearchAdvice {
+  std::string_view keyword;
+  std::int64_t found = 0;
+  std::int64_t advised = 0;  ///< at least so much
+};
+
+/// A search that was interrupted or ended, and is to be continued with a raised budget.
+struct SearchHistory {
+  int budget = 0;                       ///< Max_No_Evaluations then
+  int evaluations = 0;                  ///< that stand without a gap from the first one on
+  std::vector<EarlierSearch> searches;  ///< those that it was a continuation of
+};
+
+/// What becomes of an earlier search when its budget is raised.
+struct RaisedBudget {
+  std::string refusal;                                    ///< why it cannot be continued; empty when it can
+  std::string note;                                       ///< what the log should say, one line; empty: nothing
+  int keptEvaluations = std::numeric_limits<int>::max();  ///< those with higher numbers are made again
+  std::optional<EarlierSearch> earlier;                   ///< the earlier search, where this one starts from its best
+};
+
+/// A search together with its settings: everything that a setup, a run, a restart or a report asks about it. One form
+/// per search, beside its algorithm; search_methods.h lists them.
+class SearchMethod {
+ public:
+  SearchMethod() = default;
+  SearchMethod(const SearchMethod&) = delete;
+  SearchMethod& operator=(const SearchMethod&) = delete;
+  virtual ~SearchMethod() = default;
+
+  virtual const SearchFacts& facts() const = 0;
+
+  /// Its section inside OPTIMISATION_ALGORITHM with its keywords, bound to this object's settings.
+  virtual BoundSection section() = 0;
+  /// Settings that are small for n variable parameters.
+  virtual std::vector<SearchAdvice> advice(std::size_t n) const = 0;
+  /// The fixed text for a budget below 1, where the search has its own.
+  virtual std::string_view budgetRefusal() const { return {}; }
+  /// Whether it evaluates a sample, from which a scale of the objective functions can be taken.
+  virtual bool evaluatesSample(const InitialSampleSettings& sample) const = 0;
+
+  /// Points of its population; 0 where it has none.
+  virtual std::int64_t populationSize() const { return 0; }
+  /// Least number of evaluations in a loop.
+  virtual double evaluationsPerLoop() const { return 1.0; }
+  /// Loops after the initial sample before so many parameter sets are evaluated that a surrogate model can be asked.
+  virtual double loopsBefore(double sets) const {
+    static_cast<void>(sets);
+    return 0.0;
+  }
+
+  virtual RaisedBudget raiseBudget(const SearchHistory& history, const StoppingCriteria& stopping,
+                                   const InitialSampleSettings& sample) const = 0;
+
+  /// The search itself. `problem.evaluator` and `problem.random` must outlive it.
+  virtual std::unique_ptr<SearchAlgorithm> make(SearchProblem problem) const = 0;
+  /// Makes the search and runs it from its start to its end. Throws what runSearch() throws.
+  virtual SearchSummary run(SearchProblem problem, const PeriodicStep& periodicStep) const;
+
+  /// Points of a simplex: SCE's subcomplex and PSE's simplex are one setting.
+  SimplexSettings simplex;
+};
+
+/// Evaluations that the sample and so many loops after it make, at the least.
+double evaluationsAfter(const SearchMethod& method, double loops);
+
+}  // namespace mirevo

@@ -1,0 +1,18 @@
+#pragma once
+
+#include <memory>
+#include <span>
+#include <vector>
+
+#include "algorithms/searches/search_method.h"
+
+namespace mirevo {
+
+/// The names of all searches, those with a number first.
+std::span<const CodeName> searchNames();
+/// The search of that number or name, with the default settings; nullptr when there is none.
+std::unique_ptr<SearchMethod> makeSearchMethod(const SetupValue& value);
+/// Every search once, for the manual.
+std::vector<std::unique_ptr<SearchMethod>> searchMethods();
+
+}  // namespace mirevo

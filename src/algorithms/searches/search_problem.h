@@ -1,0 +1,35 @@
+#pragma once
+
+#include <cstdint>
+#include <vector>
+
+#include "algorithms/numbers/search_bounds.h"
+#include "algorithms/numbers/uniform_generator.h"
+#include "algorithms/searches/initial_sample.h"
+#include "algorithms/searches/stopping_criteria.h"
+#include "common/parameter_set.h"
+#include "evaluation/evaluator.h"
+
+namespace mirevo {
+
+class ProposalSelector;
+
+/// A search with a smaller budget from whose best parameter set a search with a raised one continues.
+struct EarlierSearch {
+  std::int32_t maxEvaluations = 0;  ///< its budget, counted from the first evaluation of the run
+  std::int32_t lastEvaluation = 0;  ///< the number of its last evaluation
+};
+
+/// What a search works on. The references must outlive the search.
+struct SearchProblem {
+  SearchBounds bounds;
+  StoppingCriteria stopping;
+  InitialSampleSettings initialSample;
+  std::vector<ParameterSet> givenSample;  ///< search scale; the sets of the initial sample file
+  Evaluator& evaluator;
+  UniformGenerator& random;
+  ProposalSelector* selector = nullptr;             ///< of a surrogate-assisted search
+  std::vector<EarlierSearch> earlierSearches = {};  ///< that this one continues, in their order
+};
+
+}  // namespace mirevo

@@ -1,0 +1,144 @@
+#pragma once
+
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "common/settings/keyword_row.h"
+#include "platform/kdx/kdx.h"
+#include "run/access/setup_schema.h"
+#include "run/progress/run_log.h"
+
+namespace mirevo {
+
+class SetupSection;
+
+/// A setting that bears on the results, as the setup has it.
+struct ResultSetting {
+  std::string section;  ///< names below the target, `/` between them
+  std::string keyword;
+  std::string value;  ///< that of a coded keyword by its number, where it has one; a file's relative to the setup
+  bool isDefault = false;
+};
+
+/// A parsed setup file and the log that everything read from it is echoed to.
+class SetupFile final {
+ public:
+  /// `fileName` is the name that messages show, `folder` the absolute folder against which file names are resolved.
+  /// Throws FatalError with "Error: Unable to open " and the name for a text that is not KDX. `schema` and `log` must
+  /// outlive this.
+  SetupFile(const std::string& fileName, std::string folder, std::string_view text, const SetupSchema& schema,
+            RunLog& log);
+
+  /// The target MIREVO_PARAMETERS. Sections of it may refer to this object, which must outlive them.
+  SetupSection target();
+
+  const KdxDocument& document() const { return document_; }
+  const SetupSchema& schema() const { return schema_; }
+  RunLog& log() { return log_; }
+  /// "setup.kdx:14:9"
+  std::string location(KdxPosition position) const;
+  /// Absolute and normal form of a file name of the setup; blank stays blank.
+  std::string resolve(std::string_view fileName) const;
+  /// The inverse of resolve() for a file in or below the setup's folder, so that the folder can be moved; others as
+  /// they are.
+  std::string relative(const std::string& path) const;
+
+  /// Every setting that bears on the results, in reading order.
+  std::vector<ResultSetting>& resultSettings() { return resultSettings_; }
+
+ private:
+  KdxDocument document_;
+  std::string folder_;
+  const SetupSchema& schema_;
+  RunLog& log_;
+  std::vector<ResultSetting> resultSettings_;
+};
+
+/// An open section of the setup: reads its keywords as their rows have them, echoes them, checks them, and knows where
+/// each is in the file, so that whatever is wrong with a value is reported with its location.
+class SetupSection final {
+ public:
+  SetupSection(SetupFile& file, const KdxSection& node, std::string path, std::string pattern);
+
+  /// Opens a section inside this one and echoes its name. Throws FatalError with "Error: Unable to open section ...".
+  SetupSection open(std::string_view name) const;
+  std::optional<SetupSection> openIfPresent(std::string_view name) const;
+  /// `PARAMETER_12` for the prefix `PARAMETER_`.
+  SetupSection openItem(std::string_view prefix, std::size_t number) const;
+
+  /// The section's name in the log, for a section that is returned to after others.
+  void echoName() const;
+
+  /// Reads every keyword into its field, then checks each value against its row. Throws FatalError with "Error: Unable
+  /// to read keyword ..." or the row's own refusal.
+  template <class Settings>
+  void read(const SettingSection<Settings>& section, Settings& settings) const {
+    read(BoundSection(section, settings));
+  }
+  void read(const BoundSection& section) const;
+  /// The two halves of read().
+  void take(const BoundSection& section) const;
+  void check(const BoundSection& section) const;
+
+  /// Reads the count of a list whose items' names begin with `itemPrefix`.
+  std::size_t readCount(std::string_view itemPrefix) const;
+
+  /// Reads a list's count and its items: `items` grows by one for each, which `section` fills, and `readItem(section,
+  /// item)` reads what is inside it.
+  template <class Item, class ReadItem>
+  void readItems(std::string_view prefix, const SettingSection<Item>& section, std::vector<Item>& items,
+                 ReadItem readItem) const {
+    const std::size_t count = readCount(prefix);
+    for (std::size_t i = 0; i < count; ++i) {
+      const SetupSection opened = openItem(prefix, i + 1);
+      items.emplace_back();
+      opened.read(section, items.back());
+      readItem(opened, items.back());
+    }
+  }
+  /// The same for a list that must not be empty.
+  template <class Item, class ReadItem>
+  void readItems(std::string_view prefix, const SettingSection<Item>& section, std::vector<Item>& items,
+                 std::string_view emptyMessage, ReadItem readItem) const {
+    readItems(prefix, section, items, readItem);
+    if (items.empty()) refuse(emptyMessage, kItemCountKeyword, "expected 1 or more, found 0");
+  }
+
+  /// Ends the run with `message`; `explanation` follows the keyword's location.
+  [[noreturn]] void refuse(std::string_view message, std::string_view keyword, std::string_view explanation) const;
+  [[noreturn]] void refuse(const SettingRefusal& refusal) const;
+  /// Refuses unless there is nothing to refuse.
+  void require(const std::optional<SettingRefusal>& refusal) const {
+    if (refusal) refuse(*refusal);
+  }
+  /// A warning in the log with the keyword's location.
+  void warn(std::string_view keyword, std::string_view text) const;
+  /// A line below the keyword's echo in the log.
+  void note(std::string_view keyword, std::string_view text) const;
+
+  /// The name without its path.
+  std::string name() const;
+  const std::string& path() const { return path_; }
+  /// The keyword's text as the setup has it, without trailing blanks; empty when it is absent.
+  std::string written(std::string_view keyword) const;
+
+ private:
+  void takeRow(const KeywordRow& row, void* settings) const;
+  void takeValue(const KeywordRow& row, const SetupValue& value, bool isDefault, void* settings) const;
+  SetupValue convert(const KeywordRow& row, const KdxKeyword& keyword) const;
+  /// Refuses the value of the row unless it is within its range.
+  void checkRange(const KeywordRow& row, const BoundSection& section) const;
+  std::string location(std::string_view keyword) const;
+  [[noreturn]] void refuseMissing(const KeywordRow& row) const;
+  [[noreturn]] void refuseToRead(KdxPosition position, std::string_view keyword, std::string_view explanation) const;
+  void echo(const KeywordRow& row, const SetupValue& value, bool isDefault) const;
+
+  SetupFile* file_;
+  const KdxSection* node_;
+  std::string path_;     ///< names below the target, `/` between them
+  std::string pattern_;  ///< the same as the schema has it
+};
+
+}  // namespace mirevo

@@ -1,0 +1,36 @@
+#pragma once
+
+#include <string>
+#include <string_view>
+#include <unordered_map>
+#include <vector>
+
+#include "common/settings/keyword_row.h"
+
+namespace mirevo {
+
+/// The target of a setup file.
+inline constexpr std::string_view kSetupTarget = "MIREVO_PARAMETERS";
+
+/// Every section that a setup may have, with its keywords, in reading order. The rows must outlive the schema.
+class SetupSchema final {
+ public:
+  explicit SetupSchema(std::vector<const SectionRow*> sections);
+
+  const std::vector<const SectionRow*>& sections() const { return sections_; }
+  /// nullptr for a path that the setup does not know; item numbers as `n`.
+  const SectionRow* findSection(std::string_view path) const;
+  /// nullptr for a keyword that the section does not know.
+  const KeywordRow* findKeyword(std::string_view section, std::string_view name) const;
+  /// The names of the sections directly inside `path` (empty: of the target), item numbers as `n`.
+  std::vector<std::string> sectionNamesInside(std::string_view path) const;
+
+ private:
+  std::vector<const SectionRow*> sections_;
+  std::unordered_map<std::string_view, const SectionRow*> byPath_;
+};
+
+/// The name of an item section without its number, `PARAMETER_n` for `PARAMETER_12`; other names as they are.
+std::string itemPattern(std::string_view name);
+
+}  // namespace mirevo

@@ -1,0 +1,340 @@
+#include "run/setup/model_keywords.h"
+
+#include <map>
+
+#include <fmt/format.h>
+
+#include "run/setup/validation.h"
+
+namespace mirevo {
+namespace {
+
+/// Rows of these settings bear on no result.
+constexpr bool kNotOfResults = false;
+
+std::string nameOfMeasure(const void* measure) {
+  return static_cast<const OutputMeasure*>(measure)->name;
+}
+std::string nameOfObjective(const void* objective) {
+  return static_cast<const ObjectiveFunction*>(objective)->name;
+}
+std::string nameOfParameter(const void* parameter) {
+  return static_cast<const ModelParameter*>(parameter)->name;
+}
+
+SettingSection<SeriesReference> seriesSection(std::string_view path, std::string_view meaning,
+                                              std::string_view fileMeaning) {
+  return {{path,
+           "for each measure of interface type 0",
+           meaning,
+           {setting<&SeriesReference::fileName>(
+                {.name = "File_Name", .type = KeywordType::fileName, .meaning = fileMeaning}),
+            setting<&SeriesReference::itemNo>(
+                {.name = "Item_No", .defaultValue = "1", .meaning = "Which item of the file, from 1."})}}};
+}
+
+}  // namespace
+
+const SectionRow& listSection(std::string_view path) {
+  static const std::map<std::string_view, SectionRow> rows = [] {
+    std::map<std::string_view, SectionRow> lists;
+    for (const auto& [list, meaning] : {
+             std::pair{"MIREVO_SIMULATION_OPTION/SIMBATCH",
+                       "What one model run starts, one item after another. At least one item."},
+             std::pair{"MIREVO_SIMULATION_OPTION/SIMPARAM",
+                       "The model's own input files into which parameter values are written. At least one item."},
+             std::pair{"MODEL_PARAMETERS", "The parameters of the model. At least one, and at least one variable."},
+             std::pair{"MODEL_PARAMETERS/INTERNAL_CONSTRAINTS",
+                       "Comparisons that every parameter set must satisfy; one that does not is not run."},
+             std::pair{"ObjectiveFunctions/OUTPUT_MEASURES", "The output measures. At least one."},
+             std::pair{"ObjectiveFunctions/OBJECTIVE_FUNCTIONS", "The objective functions. At least one."},
+             std::pair{"SAVE_OUTPUT_FILES",
+                       "Model output files that are kept for each evaluation. A count of 0 keeps none."},
+         }) {
+      lists.emplace(list, SectionRow{list, "always", meaning, {itemCount()}});
+    }
+    return lists;
+  }();
+  return rows.at(path);
+}
+
+const SettingSection<BatchItem>& batchItemSection() {
+  static const SettingSection<BatchItem> section{
+      {"MIREVO_SIMULATION_OPTION/SIMBATCH/SIMBATCHITEM_n",
+       "for each item",
+       "A batch file.",
+       {setting<&BatchItem::batchFileName>(
+            {.name = "BatchFileName",
+             .type = KeywordType::fileName,
+             .meaning =
+                 "Runs the model. Its folder in the first item is the base folder, in or below which all files of "
+                 "the model are. Executed if its execute permission is set, otherwise passed to `/bin/sh`."}),
+        setting<&BatchItem::arguments>(
+            {.name = "Arguments", .defaultValue = "''", .meaning = "Its arguments, split as a shell splits words."})}}};
+  return section;
+}
+
+const SettingSection<ParameterFileItem>& parameterFileSection() {
+  using Item = ParameterFileItem;
+  static const SettingSection<ParameterFileItem> section{
+      {"MIREVO_SIMULATION_OPTION/SIMPARAM/SIMPARAMITEM_n",
+       "for each item",
+       "A model parameter file and its template.",
+       {setting<&Item::templateType>(
+            {.name = "FileType",
+             .defaultValue = "0",
+             .codes = kTemplateTypeNames,
+             .meaning = "1: the template marks values by numeric IDs (`Parameter_IDValue`). Any other number: by names "
+                        "between delimiters, the delimiter being the template's first line."}),
+        setting<&Item::paramFileName>({.name = "ParamFileName",
+                                       .type = KeywordType::fileName,
+                                       .meaning = "The model's input file that is written before each run. It must "
+                                                  "exist, in or below the base folder."}),
+        setting<&Item::templateFileName>({.name = "TemplateFileName",
+                                          .type = KeywordType::fileName,
+                                          .meaning = "Its template, in or below the base folder."})}}};
+  return section;
+}
+
+const SettingSection<ModelParameter>& keyLinesSection() {
+  static const SettingSection<ModelParameter> section{
+      {"MODEL_PARAMETERS/PARAMETER_n/Keywords",
+       "for each parameter that has it",
+       "Lines that describe the location of the parameter in a model file. Kept with the parameter, not interpreted.",
+       {setting<&ModelParameter::keyLines>({.name = "KeyLine",
+                                            .defaultValue = "''",
+                                            .meaning = "A line; the keyword may be repeated.",
+                                            .bearsOnResults = kNotOfResults})}}};
+  return section;
+}
+
+const SettingSection<ModelParameter>& parameterSection() {
+  using Parameter = ModelParameter;
+  static const SettingSection<ModelParameter> section{
+      {"MODEL_PARAMETERS/PARAMETER_n",
+       "for each item",
+       "A parameter, on the model scale.",
+       {checked<Parameter>(
+            setting<&Parameter::initialValue>({.name = "Initial_Value",
+                                               .unit = "of the parameter",
+                                               .meaning = "Value of a fixed parameter, starting point of a variable "
+                                                          "one, which must be within its bounds."}),
+            [](const Parameter& parameter) { return validateParameterBounds(parameter); }),
+        setting<&Parameter::lowerBound>(
+            {.name = "Lower_Bound",
+             .unit = "of the parameter",
+             .meaning = "Lowest value. Greater than 0 for a logarithmic variable parameter."}),
+        setting<&Parameter::upperBound>({.name = "Upper_Bound",
+                                         .unit = "of the parameter",
+                                         .meaning = "Highest value, not below the lowest; above it for a variable "
+                                                    "parameter that SCE or PSE searches."}),
+        setting<&Parameter::transformationType>(
+            {.name = "Transformation_Type",
+             .defaultValue = "0",
+             .range = between(0, 2),
+             .codes = kTransformationTypeNames,
+             .refusal = "Error: Transformation type invalid for parameter ",
+             .meaning = "Scale of the search: 0 the value itself, 1 its natural logarithm, 2 steps of 1 from the lower "
+                        "bound."}),
+        setting<&Parameter::parameterType>(
+            {.name = "Parameter_Type",
+             .defaultValue = "0",
+             .range = between(0, 2),
+             .codes = kParameterTypeNames,
+             .refusal = "Error: Parameter type invalid for parameter ",
+             .meaning = "0 variable, 1 fixed at the initial value, 2 dependent: the value of its equation."}),
+        setting<&Parameter::idValue>(
+            {.name = "Parameter_IDValue",
+             .defaultValue = "0.0",
+             .meaning = "A tiny number such as 1.5E-035 that stands for the parameter in numeric-ID templates."}),
+        setting<&Parameter::name>({.name = "Parameter_Name",
+                                   .type = KeywordType::name,
+                                   .meaning = "Unique name, used in templates, equations, messages and result files."}),
+        setting<&Parameter::equation>({.name = "Parameter_Equation",
+                                       .type = KeywordType::freeText,
+                                       .defaultValue = "''",
+                                       .meaning = "Equation of a dependent parameter over the names of others."}),
+        setting<&Parameter::comment>({.name = "Comment",
+                                      .type = KeywordType::freeText,
+                                      .defaultValue = "''",
+                                      .meaning = "Free text.",
+                                      .bearsOnResults = kNotOfResults})},
+       nameOfParameter}};
+  return section;
+}
+
+const SettingSection<InternalConstraint>& constraintSection() {
+  using Constraint = InternalConstraint;
+  static const SettingSection<InternalConstraint> section{
+      {"MODEL_PARAMETERS/INTERNAL_CONSTRAINTS/CONSTRAINT_n",
+       "for each item",
+       "A constraint: left equation, operator, right equation, over the parameters' names.",
+       {setting<&Constraint::leftEquation>(
+            {.name = "Left_Equation", .type = KeywordType::freeText, .meaning = "Left side."}),
+        setting<&Constraint::rightEquation>(
+            {.name = "Right_Equation", .type = KeywordType::freeText, .meaning = "Right side."}),
+        checked<Constraint>(
+            setting<&Constraint::logicalOperator>(
+                {.name = "Logical_Operator",
+                 .range = between(0, 3),
+                 .codes = kLogicalOperatorNames,
+                 .refusal = "Error: Invalid logical operator in ",
+                 .meaning =
+                     "The left side must be 0 less than, 1 at most, 2 greater than, 3 at least the right side."}),
+            [](const Constraint& constraint) { return validateEquations(constraint); })}}};
+  return section;
+}
+
+const SettingSection<RunConfig>& judgementSection() {
+  static const SettingSection<RunConfig> section{
+      {"ObjectiveFunctions",
+       "always",
+       "How a model run is judged.",
+       {setting<RunConfig>([](auto& c) -> auto& { return c.period.start; },
+                           {.name = "Start_Date", .meaning = "Start of the evaluation period, inclusive."}),
+        checked<RunConfig>(setting<RunConfig>([](auto& c) -> auto& { return c.period.end; },
+                                              {.name = "End_Date",
+                                               .meaning = "End of the evaluation period, inclusive. Not before the "
+                                                          "start."}),
+                           [](const RunConfig& config) { return validateEvaluationPeriod(config.period); }),
+        setting<&RunConfig::aggregationMethod>(
+            {.name = "Aggregation_Method",
+             .defaultValue = "0",
+             .range = between(0, 3),
+             .codes = kAggregationMethodNames,
+             .refusal = "Error: Objective function aggregation method invalid",
+             .meaning = "How objective functions are put on one scale before they are added up: 0 not at all, 1 common "
+                        "distance scale, 2 common probability scale; 3 makes every aggregate 0."})}}};
+  return section;
+}
+
+const SettingSection<OutputMeasure>& measureSection() {
+  using Measure = OutputMeasure;
+  static const SettingSection<OutputMeasure> section{
+      {"ObjectiveFunctions/OUTPUT_MEASURES/MEASURE_n",
+       "for each item",
+       "A comparison of a simulated with an observed series reduced to one number, or a number that the model wrote.",
+       {setting<&Measure::name>(
+            {.name = "Name", .type = KeywordType::name, .meaning = "Name, in messages and result files."}),
+        setting<&Measure::interfaceType>(
+            {.name = "Interface_Type",
+             .defaultValue = "0",
+             .range = between(0, 1),
+             .codes = kInterfaceTypeNames,
+             .refusal = "Error: Interface type invalid for output measure ",
+             .meaning = "0: a statistic of two time series. 1: a number that the model wrote to the output-measure "
+                        "file."}),
+        checked<Measure>(setting<&Measure::measurementNo>(
+                             {.name = "MeasurementNo",
+                              .defaultValue = "1",
+                              .range = from(1),
+                              .meaning = "Which number of the output-measure file; used with interface type 1.",
+                              .checkOrder = 1}),
+                         [](const Measure& measure) { return validateMeasurementNumber(measure); }),
+        setting<&Measure::statisticType>(
+            {.name = "Statistic_Type",
+             .defaultValue = "0",
+             .range = between(0, 4),
+             .codes = kStatisticTypeNames,
+             .refusal = "Error: Statistic type invalid for output measure ",
+             .meaning = "Of the weighted differences simulated minus observed: 0 mean, 1 root mean square, 2 standard "
+                        "deviation; weighted difference of 3 the largest, 4 the smallest values."}),
+        // One text for both weights on purpose; the location below it tells them apart.
+        setting<&Measure::weight>({.name = "Weight",
+                                   .defaultValue = "1.0",
+                                   .range = kNonNegative,
+                                   .refusal = "Error: Weight invalid for output measure ",
+                                   .meaning = "Weight of differences at or below 0."}),
+        setting<&Measure::weightAbove>({.name = "Weight_Above",
+                                        .defaultValue = "1.0",
+                                        .range = kNonNegative,
+                                        .refusal = "Error: Weight invalid for output measure ",
+                                        .meaning = "Weight of differences above 0."}),
+        setting<&Measure::functionName>({.name = "Function_Name",
+                                         .defaultValue = "''",
+                                         .meaning = "The objective function that the measure belongs to; if blank, the "
+                                                    "measure is only reported."})},
+       nameOfMeasure}};
+  return section;
+}
+
+const SettingSection<SeriesReference>& simulationFileSection() {
+  static const SettingSection<SeriesReference> section =
+      seriesSection("ObjectiveFunctions/OUTPUT_MEASURES/MEASURE_n/SIMULATION_FILE", "The simulated series.",
+                    "The simulated time-series file, in or below the base folder.");
+  return section;
+}
+
+const SettingSection<SeriesReference>& observationFileSection() {
+  static const SettingSection<SeriesReference> section =
+      seriesSection("ObjectiveFunctions/OUTPUT_MEASURES/MEASURE_n/OBSERVATION_FILE", "The observed series.",
+                    "The observed time-series file.");
+  return section;
+}
+
+const SettingSection<ObjectiveFunction>& objectiveSection() {
+  using Function = ObjectiveFunction;
+  static const SettingSection<ObjectiveFunction> section{
+      {"ObjectiveFunctions/OBJECTIVE_FUNCTIONS/OBJECTIVE_n",
+       "for each item",
+       "An objective function over the output measures that name it.",
+       {setting<&Function::name>({.name = "Name",
+                                  .type = KeywordType::name,
+                                  .meaning = "Unique name, by which output measures refer to it."}),
+        setting<&Function::functionType>(
+            {.name = "Function_Type",
+             .defaultValue = "0",
+             .range = between(0, 2),
+             .codes = kFunctionTypeNames,
+             .refusal = "Error: Function type invalid for objective function ",
+             .meaning = "Over its output measures: 0 sum of the values, 1 of the absolute values, 2 of the squares."}),
+        setting<&Function::weight>({.name = "Weight",
+                                    .defaultValue = "1.0",
+                                    .range = kNonNegative,
+                                    .refusal = "Error: Weight invalid for objective function ",
+                                    .meaning = "Weight in the aggregate."}),
+        setting<&Function::standardDeviation>(
+            {.name = "Standard_Deviation",
+             .defaultValue = kNoDefault,
+             .range = kPositive,
+             .refusal = "Error: Standard deviation invalid for objective function ",
+             .unit = "of the function",
+             .meaning = "Scale of the transformation of aggregation methods 1 and 2. Without it, that of the search's "
+                        "initial sample."}),
+        setting<&Function::location>(
+            {.name = "Location",
+             .defaultValue = kNoDefault,
+             .unit = "of the function",
+             .meaning =
+                 "Location of the transformation: added after the division by the standard deviation (method 1), "
+                 "or the mean (method 2). Without it, from the search's initial sample."})},
+       nameOfObjective}};
+  return section;
+}
+
+const SettingSection<SavedOutputFile>& savedFileSection() {
+  static const SettingSection<SavedOutputFile> section{
+      {"SAVE_OUTPUT_FILES/OUTPUT_FILE_n",
+       "for each item",
+       "A file to keep.",
+       {setting<&SavedOutputFile::fileName>({.name = "File_name",
+                                             .type = KeywordType::fileName,
+                                             .meaning = "A file that the model writes, in or below the base folder.",
+                                             .bearsOnResults = kNotOfResults})}}};
+  return section;
+}
+
+const SettingSection<RunConfig>& measureFileSection() {
+  static const SettingSection<RunConfig> section{
+      {"ObjectiveFunctions/OUTPUT_MEASURES/OUTPUT_MEASURE_FILE",
+       "always",
+       "The file from which measures of interface type 1 take their numbers.",
+       {setting<&RunConfig::measureFile>(
+           {.name = "File_Name",
+            .type = KeywordType::fileName,
+            .defaultValue = "''",
+            .meaning = "In or below the base folder; required where a measure has interface type 1."})}}};
+  return section;
+}
+
+}  // namespace mirevo

@@ -1,0 +1,28 @@
+#pragma once
+
+#include <vector>
+
+#include "common/settings/keyword_row.h"
+#include "run/setup/run_config.h"
+
+namespace mirevo {
+
+// The sections that describe the model, its parameters, and how its runs are judged, with their keywords.
+
+const SettingSection<BatchItem>& batchItemSection();
+const SettingSection<ParameterFileItem>& parameterFileSection();
+const SettingSection<ModelParameter>& keyLinesSection();
+const SettingSection<ModelParameter>& parameterSection();
+const SettingSection<InternalConstraint>& constraintSection();
+const SettingSection<RunConfig>& judgementSection();
+const SettingSection<OutputMeasure>& measureSection();
+const SettingSection<SeriesReference>& simulationFileSection();
+const SettingSection<SeriesReference>& observationFileSection();
+const SettingSection<ObjectiveFunction>& objectiveSection();
+const SettingSection<SavedOutputFile>& savedFileSection();
+const SettingSection<RunConfig>& measureFileSection();
+
+/// The section of a list: its count alone. `path` is below the target.
+const SectionRow& listSection(std::string_view path);
+
+}  // namespace mirevo

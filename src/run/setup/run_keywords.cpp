@@ -1,0 +1,141 @@
+#include "run/setup/run_keywords.h"
+
+#include "run/setup/model_keywords.h"
+#include "run/setup/validation.h"
+#include "run/tasks/tasks.h"
+
+namespace mirevo {
+namespace {
+
+/// Rows of these settings bear on no result.
+constexpr bool kNotOfResults = false;
+
+constexpr CodeName kRestartNames[] = {{0, "no"}, {1, "continue"}, {2, "continue and repeat failed runs"}};
+
+/// Sections that are accepted and not used.
+const SectionRow& reservedSection() {
+  static const SectionRow section{
+      "TMEMPARAM",
+      "never",
+      "Accepted and not used.",
+      {unused({.name = "TmemOption", .defaultValue = "0", .meaning = "Not used."}, KeywordType::integer),
+       unused({.name = "TmemClient", .defaultValue = "0", .meaning = "Not used."}, KeywordType::integer),
+       unused({.name = "MaxSimTime", .defaultValue = "0.0", .meaning = "Not used."}, KeywordType::real)}};
+  return section;
+}
+
+}  // namespace
+
+const SettingSection<RunConfig>& simulationOptionSection() {
+  static const SettingSection<RunConfig> section{
+      {"MIREVO_SIMULATION_OPTION",
+       "always",
+       "The task of the run and the model that it runs.",
+       {choice<RunConfig>([](RunConfig& config, const SetupValue& value) { config.task = makeTask(value); },
+                          {.name = "Option",
+                           .codes = taskNames(),
+                           .meaning = "The task: 0 scenario runs, 1 sensitivity analysis, 2 parameter optimisation, 3 "
+                                      "uncertainty analysis. Any other number runs nothing and ends normally."}),
+        setting<&RunConfig::title>({.name = "Title",
+                                    .defaultValue = "''",
+                                    .meaning = "Title of the run, in the log and the result files.",
+                                    .bearsOnResults = kNotOfResults}),
+        setting<&RunConfig::restart>(
+            {.name = "Restart",
+             .defaultValue = "0",
+             .range = between(0, 2),
+             .codes = kRestartNames,
+             .refusal = "Error: Invalid restart option",
+             .meaning =
+                 "1: an interrupted run continues where it was cut off. 2: the same, and failed model runs at its "
+                 "end are repeated. 0: earlier results are kept under a numbered name and the run starts afresh.",
+             .bearsOnResults = kNotOfResults}),
+        setting<&RunConfig::failedRunFolders>(
+            {.name = "FailedRunFolders",
+             .defaultValue = "3",
+             .range = kNonNegative,
+             .refusal = "Error: Invalid No. of folders of failed model runs",
+             .unit = "model runs",
+             .meaning = "Number of failed model runs, counted from the first, whose process folder is kept as "
+                        "`<setup>_Failed<evaluation number>`.",
+             .bearsOnResults = kNotOfResults}),
+        setting<&RunConfig::writesReport>(
+            {.name = "Report",
+             .defaultValue = "1",
+             .meaning = "1: a report for the browser is written at the end of the run, as `<setup>_Report.html`. 0: "
+                        "none.",
+             .bearsOnResults = kNotOfResults})}}};
+  return section;
+}
+
+const SettingSection<RunConfig>& slotsSection() {
+  static const SettingSection<RunConfig> section{
+      {"SimultaneousSimulations",
+       "always",
+       "How many model runs are made at once.",
+       {checked<RunConfig>(
+            setting<&RunConfig::simultaneousSimulations>(
+                {.name = kSlotsKeyword,
+                 .defaultValue = "1",
+                 .range = from(1),
+                 .refusal = "Error: Invalid No. of processes",
+                 .unit = "model runs",
+                 .meaning = "Model runs at once, each in a process folder of its own; no more than the run "
+                            "has evaluations. In an optimisation more than 1 needs PSE. In an MPI job: 1 "
+                            "on each worker.",
+                 .bearsOnResults = kNotOfResults}),
+            [](const RunConfig& config) { return validateProcessCount(config); }),
+        setting<&RunConfig::useSingleThread>({.name = "UseSingleThread",
+                                              .defaultValue = "0",
+                                              .meaning = "1: tells each model run to use one thread.",
+                                              .bearsOnResults = kNotOfResults}),
+        setting<&RunConfig::processFolder>({.name = "ProcessFolder",
+                                            .type = KeywordType::fileName,
+                                            .defaultValue = "''",
+                                            .meaning =
+                                                "Folder in which the process folders are made, such as a disk of "
+                                                "the computing node; blank: beside the setup.",
+                                            .bearsOnResults = kNotOfResults}),
+        setting<&RunConfig::maxSimulationTime>(
+            {.name = "MaxSimulationTime",
+             .defaultValue = "0.0",
+             .range = kNonNegative,
+             .refusal = "Error: Invalid maximum simulation time",
+             .unit = "s",
+             .meaning = "Longest time of a model run; one that takes longer is ended and has failed. 0: no limit.",
+             .bearsOnResults = kNotOfResults})}}};
+  return section;
+}
+
+const SetupSchema& setupSchema() {
+  static const SetupSchema schema = [] {
+    std::vector<const SectionRow*> rows{&simulationOptionSection().row,
+                                        &listSection("MIREVO_SIMULATION_OPTION/SIMBATCH"),
+                                        &batchItemSection().row,
+                                        &listSection("MIREVO_SIMULATION_OPTION/SIMPARAM"),
+                                        &parameterFileSection().row,
+                                        &listSection("MODEL_PARAMETERS"),
+                                        &keyLinesSection().row,
+                                        &parameterSection().row,
+                                        &listSection("MODEL_PARAMETERS/INTERNAL_CONSTRAINTS"),
+                                        &constraintSection().row,
+                                        &judgementSection().row,
+                                        &listSection("ObjectiveFunctions/OUTPUT_MEASURES"),
+                                        &measureSection().row,
+                                        &simulationFileSection().row,
+                                        &observationFileSection().row,
+                                        &listSection("ObjectiveFunctions/OBJECTIVE_FUNCTIONS"),
+                                        &objectiveSection().row,
+                                        &listSection("SAVE_OUTPUT_FILES"),
+                                        &savedFileSection().row};
+    for (const auto& task : allTasks()) {
+      const auto sections = task->sections();
+      rows.insert(rows.end(), sections.begin(), sections.end());
+    }
+    rows.insert(rows.end(), {&slotsSection().row, &measureFileSection().row, &reservedSection()});
+    return SetupSchema(std::move(rows));
+  }();
+  return schema;
+}
+
+}  // namespace mirevo

@@ -1,0 +1,17 @@
+#include "run/tasks/analysis_names.h"
+
+namespace mirevo {
+
+AnalysisNames analysisNames(const TaskContext& context) {
+  AnalysisNames names{context.space.names, {}, {}};
+  for (const OutputMeasure& measure : context.measures) names.measures.push_back(measure.name);
+  for (const ObjectiveFunction& objective : context.objectives) names.objectives.push_back(objective.name);
+  return names;
+}
+
+void logReport(const TaskContext& context, std::span<const std::string> report) {
+  context.log.line("");
+  for (const std::string& line : report) context.log.line(line);
+}
+
+}  // namespace mirevo

@@ -1,0 +1,216 @@
+#include "run/tasks/optimisation_task.h"
+
+#include <algorithm>
+#include <cmath>
+#include <utility>
+
+#include <fmt/format.h>
+
+#include "common/text.h"
+#include "run/access/file_validation.h"
+
+namespace mirevo {
+namespace {
+
+constexpr std::string_view kSurrogateKeyword = "Use_Surrogate_Model";
+
+const SettingSection<OptimisationTask>& optimisationSection() {
+  static const SettingSection<OptimisationTask> section{
+      {"OPTIMISATION_ALGORITHM",
+       "when `Option` is 2",
+       "Parameter optimisation.",
+       {choice<OptimisationTask>(
+            [](OptimisationTask& task, const SetupValue& value) { task.method = makeSearchMethod(value); },
+            {.name = "Algorithm_Type",
+             .range = between(0, 2),
+             .codes = searchNames(),
+             .refusal = "Error: Invalid optimisation algorithm type selection",
+             .meaning = "0 Shuffled Complex Evolution, 1 Population Simplex Evolution, 2 Dynamically Dimensioned "
+                        "Search."}),
+        setting<&OptimisationTask::surrogateUse>(
+            {.name = kSurrogateKeyword,
+             .defaultValue = "0",
+             .codes = kNoYesNames,
+             .meaning = "0 no, 1 yes; for SCE and PSE. Any other number runs no search."})}}};
+  return section;
+}
+
+/// Searches with a population measure it by each parameter's range. An integer parameter always has one.
+void refuseEmptyRanges(const TaskReading& reading) {
+  for (std::size_t i = 0; i < reading.parameters.size(); ++i) {
+    const ModelParameter& parameter = reading.parameters[i];
+    if (parameter.parameterType != ParameterType::variable || parameter.lowerBound < parameter.upperBound ||
+        parameter.transformationType == TransformationType::integer) {
+      continue;
+    }
+    reading.parameterSections[i].refuse(
+        "Error: Lower bound equal to upper bound for parameter " + parameter.name, "Upper_Bound",
+        fmt::format("expected more than {} for a search by SCE or PSE; Parameter_Type = 1 fixes a parameter",
+                    parameter.lowerBound));
+  }
+}
+
+/// The name of a section inside OPTIMISATION_ALGORITHM.
+std::string_view nameInside(const SectionRow& row) {
+  return row.path.substr(row.path.rfind('/') + 1);
+}
+
+void logValues(RunLog& log, std::string_view heading, std::span<const std::string> names,
+               std::span<const double> values) {
+  log.line(heading);
+  for (std::size_t i = 0; i < names.size() && i < values.size(); ++i) {
+    log.line(fmt::format("   {} = {}", names[i], formatReal(values[i])));
+  }
+}
+
+void logBestSet(const TaskContext& context, const ParameterSet& best, const EvaluationResult& result) {
+  std::vector<std::string> objectives;
+  for (const ObjectiveFunction& objective : context.objectives) objectives.push_back(objective.name);
+  logValues(context.log, "Best parameter set:", context.space.names, ToModelScale(context.space, best));
+  logValues(context.log, "Objective functions:", objectives, result.objectiveValues);
+  context.log.line(fmt::format("Aggregate: {}", formatReal(result.aggregate)));
+}
+
+}  // namespace
+
+const TaskFacts& OptimisationTask::facts() const {
+  static constexpr TaskFacts kFacts{{2, "optimisation"}, "_Optimisation.dat"};
+  return kFacts;
+}
+
+std::vector<const SectionRow*> OptimisationTask::sections() const {
+  std::vector<const SectionRow*> rows{&optimisationSection().row};
+  for (const auto& search : searchMethods()) rows.push_back(search->section().row);
+  rows.insert(rows.end(), {&initialSampleSection().row, &stoppingSection().row, &surrogateSection().row});
+  return rows;
+}
+
+void OptimisationTask::read(const TaskReading& reading) {
+  const SetupSection section = reading.target.open("OPTIMISATION_ALGORITHM");
+  section.read(optimisationSection(), *this);
+  if (surrogateUse != SurrogateUse::no && surrogateUse != SurrogateUse::yes) {
+    section.warn(kSurrogateKeyword, "neither 0 nor 1, no search will be run");
+  }
+  readMethod(reading, section);
+
+  const SetupSection sample = section.open(nameInside(initialSampleSection().row));
+  InitialSampleSection filled{initialSample, randomSeed};
+  sample.read(initialSampleSection(), filled);
+  if (initialSample.generation == SampleGeneration::fromFile) {
+    validateFileOpens(initialSample.fileName, kInitialSampleFileKeyword, sample);
+  }
+  reading.requireScales(method->evaluatesSample(initialSample));
+
+  const SetupSection stops = section.open(nameInside(stoppingSection().row));
+  readStopping(stops);
+  if (surrogateUse == SurrogateUse::yes) readSurrogate(reading, section, stops);
+}
+
+void OptimisationTask::readMethod(const TaskReading& reading, const SetupSection& section) {
+  if (method->facts().drawsInitialSample) refuseEmptyRanges(reading);
+  const BoundSection bound = method->section();
+  const SetupSection control = section.open(nameInside(*bound.row));
+  control.read(bound);
+  // Too small a population or simplex spans too few directions and ends early, away from the optimum.
+  for (const SearchAdvice& advice : method->advice(reading.variableCount)) {
+    if (advice.found >= advice.advised) continue;
+    control.warn(advice.keyword, fmt::format("found {}, at least {} are advised for the number of variable parameters",
+                                             advice.found, advice.advised));
+  }
+}
+
+void OptimisationTask::readStopping(const SetupSection& section) {
+  const BoundSection bound(stoppingSection(), stopping);
+  section.take(bound);
+  if (const std::string_view refusal = method->budgetRefusal(); !refusal.empty() && stopping.maxEvaluations < 1) {
+    section.refuse(refusal, kBudgetKeyword, fmt::format("expected 1 or more, found {}", stopping.maxEvaluations));
+  }
+  section.check(bound);
+  const std::int64_t sampleSize = method->populationSize();
+  if (sampleSize <= stopping.maxEvaluations) return;
+  section.warn(kBudgetKeyword, fmt::format("the initial sample of {} sets is cut to {}, and no search follows",
+                                           sampleSize, stopping.maxEvaluations));
+}
+
+void OptimisationTask::readSurrogate(const TaskReading& reading, const SetupSection& section,
+                                     const SetupSection& stoppingSection) {
+  const SetupSection control = section.open(nameInside(surrogateSection().row));
+  control.read(surrogateSection(), surrogate);
+  std::optional<double> available;
+  if (usesSurrogate()) available = evaluationsAfter(*method, surrogate.initialGenerations);
+  control.require(validateSurrogateControl(surrogate, reading.variableCount, available));
+  if (!usesSurrogate()) {
+    section.warn(kSurrogateKeyword, fmt::format("{} uses no surrogate model", method->facts().longName));
+    return;
+  }
+  // A budget that is spent before the surrogate model has enough evaluated sets is spent without it.
+  const auto sample = static_cast<double>(method->populationSize());
+  const auto sets = static_cast<double>(leastSetCount(surrogate, reading.variableCount));
+  const double initialLoops = surrogate.initialGenerations;
+  const double before = std::max(sets, evaluationsAfter(*method, std::max(method->loopsBefore(sets), initialLoops)));
+  const std::int32_t budget = stopping.maxEvaluations;
+  if (budget <= sample || budget > before) return;  // where there is no loop, the surrogate makes no difference
+  stoppingSection.warn(
+      kBudgetKeyword,
+      fmt::format("found {}, the surrogate model chooses nothing before {} model evaluations: it waits for "
+                  "No_Initial_Generations = {}, and a {} for {} sets",
+                  budget, before, surrogate.initialGenerations, surrogateModelName(surrogate), sets));
+}
+
+std::string OptimisationTask::description() const {
+  return fmt::format("Parameter optimisation: {}{}", method ? method->facts().longName : "",
+                     usesSurrogate() ? " with surrogate model" : "");
+}
+
+std::vector<std::string> OptimisationTask::summaryLines(std::size_t variableCount) const {
+  if (!usesSurrogate()) return {};
+  return {fmt::format(
+      "Surrogate model: {} fitted to the {} nearest sets, chooses one of {} proposals; loops without it: {}",
+      surrogateModelName(surrogate), neighbourhoodSize(surrogate, variableCount), proposalsPerRun(surrogate),
+      surrogate.initialGenerations)};
+}
+
+SearchSummary OptimisationTask::search(const TaskContext& context) const {
+  UniformGenerator random(randomSeed);
+  SearchProblem problem{searchBounds(context.space), stopping, initialSample, {}, context.evaluator, random};
+  problem.earlierSearches = earlierSearches;
+  if (method->facts().drawsInitialSample && initialSample.generation == SampleGeneration::fromFile) {
+    problem.givenSample = loadInitialSample(initialSample.fileName, context.space);
+  }
+  std::optional<ProposalSelector> selector;
+  if (usesSurrogate()) problem.selector = &selector.emplace(surrogate, problem.bounds);
+  return method->run(std::move(problem), [&context](std::string_view line) { context.log.line(line); });
+}
+
+TaskOutcome OptimisationTask::run(const TaskContext& context) {
+  const bool isKnownUse = surrogateUse == SurrogateUse::no || surrogateUse == SurrogateUse::yes;
+  if (!isKnownUse || !method) return {std::string(kEndOfTask)};
+
+  const SearchSummary summary = search(context);
+  context.log.line("");
+  context.log.line(summary.terminationMessage);
+  const std::vector<ParameterSet> best{summary.best};
+  if (best.front().empty()) return {summary.terminationMessage};
+  if (context.searchEnded) context.searchEnded(summary);
+  logBestSet(context, best.front(), summary.bestResult);
+  context.log.line("");
+  context.log.line("Final model run with the best parameter set:");
+  context.evaluator.evaluateParameterSets(best, DispatchMode::finalRun);
+  return {summary.terminationMessage};
+}
+
+TaskReport OptimisationTask::report() const {
+  TaskReport report;
+  if (!method) return report;
+  report.algorithm = method->facts().name.name;
+  report.populationSize = static_cast<int>(method->populationSize());
+  if (usesSurrogate()) report.surrogate = surrogateModelName(surrogate);
+  return report;
+}
+
+std::optional<RaisedBudget> OptimisationTask::raisedBudget(const SearchHistory& history) const {
+  if (!method || stopping.maxEvaluations <= history.budget) return std::nullopt;
+  return method->raiseBudget(history, stopping, initialSample);
+}
+
+}  // namespace mirevo

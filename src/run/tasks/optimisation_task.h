@@ -1,0 +1,46 @@
+#pragma once
+
+#include "algorithms/searches/initial_sample.h"
+#include "algorithms/searches/search_methods.h"
+#include "algorithms/searches/stopping_criteria.h"
+#include "algorithms/surrogate/proposal_selector.h"
+#include "run/tasks/task.h"
+
+namespace mirevo {
+
+/// Any other number runs no search.
+enum class SurrogateUse : std::int32_t { no = 0, yes = 1 };
+
+/// Parameter optimisation by one of the searches, with or without a surrogate model.
+class OptimisationTask final : public Task {
+ public:
+  const TaskFacts& facts() const override;
+  std::vector<const SectionRow*> sections() const override;
+  void read(const TaskReading& reading) override;
+  bool mayHaveInitialSample() const override { return true; }
+  std::string description() const override;
+  std::vector<std::string> summaryLines(std::size_t variableCount) const override;
+  int plannedEvaluations(std::size_t /*variableCount*/) const override { return stopping.maxEvaluations; }
+  bool hasFinalRun() const override { return true; }
+  bool drawsRandomNumbers() const override { return true; }
+  bool runsInParallel() const override { return method && method->facts().runsInParallel; }
+  TaskOutcome run(const TaskContext& context) override;
+  TaskReport report() const override;
+  std::optional<RaisedBudget> raisedBudget(const SearchHistory& history) const override;
+
+  std::unique_ptr<SearchMethod> method;  ///< nullptr where the setup names none
+  SurrogateUse surrogateUse = SurrogateUse::no;
+  InitialSampleSettings initialSample;
+  StoppingCriteria stopping;
+  SurrogateSettings surrogate;
+
+ private:
+  /// Whether a surrogate model assists the search.
+  bool usesSurrogate() const { return surrogateUse == SurrogateUse::yes && method && method->facts().usesSurrogate; }
+  void readMethod(const TaskReading& reading, const SetupSection& section);
+  void readStopping(const SetupSection& section);
+  void readSurrogate(const TaskReading& reading, const SetupSection& section, const SetupSection& stoppingSection);
+  SearchSummary search(const TaskContext& context) const;
+};
+
+}  // namespace mirevo

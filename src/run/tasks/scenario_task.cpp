@@ -1,0 +1,132 @@
+#include "run/tasks/scenario_task.h"
+
+#include <fmt/format.h>
+
+#include "common/fatal_error.h"
+#include "common/text.h"
+
+namespace mirevo {
+namespace {
+
+constexpr CodeName kTypeNames[] = {{0, "single run"}, {1, "multiple runs"}};
+constexpr std::string_view kValuesKeyword = "Parameters";
+
+const SettingSection<ScenarioSettings>& scenarioSection() {
+  static const SettingSection<ScenarioSettings> section{
+      {"SCENARIOS",
+       "when `Option` is 0",
+       "Scenario runs.",
+       {setting<&ScenarioSettings::type>({.name = "Scenario_Type",
+                                          .range = between(0, 1),
+                                          .codes = kTypeNames,
+                                          .refusal = "Error: Invalid scenario type selection",
+                                          .meaning = "0 a single run with the initial values, 1 multiple runs."})}}};
+  return section;
+}
+
+const SectionRow& listSection() {
+  static const SectionRow section{"SCENARIOS/SCENARIO_RUNS",
+                                  "when `Scenario_Type` is 1",
+                                  "The parameter sets of the runs. At least one.",
+                                  {itemCount()}};
+  return section;
+}
+
+const SettingSection<ScenarioRun>& runSection() {
+  static const SettingSection<ScenarioRun> section{
+      {"SCENARIOS/SCENARIO_RUNS/SCENARIO_n",
+       "for each item",
+       "A run.",
+       {setting<&ScenarioRun::values>({.name = kValuesKeyword,
+                                       .unit = "of the parameters",
+                                       .meaning =
+                                           "One value per parameter in the order of `MODEL_PARAMETERS`, those of "
+                                           "variable parameters within their bounds; those of fixed and dependent "
+                                           "ones are read and not used."})}}};
+  return section;
+}
+
+/// The values of one run against the parameters.
+void validateScenarioRun(std::span<const double> values, std::span<const ModelParameter> parameters,
+                         const SetupSection& section) {
+  if (values.size() != parameters.size()) {
+    section.refuse(
+        "Error: Invalid number of parameter values in " + section.name(), kValuesKeyword,
+        fmt::format("expected one value for each of the {} parameters, found {}", parameters.size(), values.size()));
+  }
+  for (std::size_t i = 0; i < values.size(); ++i) {
+    const ModelParameter& parameter = parameters[i];
+    const bool isInside = values[i] >= parameter.lowerBound && values[i] <= parameter.upperBound;
+    if (parameter.parameterType != ParameterType::variable || isInside) continue;
+    section.refuse(fmt::format("Error: Value for parameter {} in {} out of bounds", parameter.name, section.name()),
+                   kValuesKeyword,
+                   fmt::format("value {}: expected {} to {}, found {}", i + 1, parameter.lowerBound,
+                               parameter.upperBound, values[i]));
+  }
+}
+
+}  // namespace
+
+const TaskFacts& ScenarioTask::facts() const {
+  static constexpr TaskFacts kFacts{{0, "scenarios"}, ".dat"};
+  return kFacts;
+}
+
+std::vector<const SectionRow*> ScenarioTask::sections() const {
+  return {&scenarioSection().row, &listSection(), &runSection().row};
+}
+
+void ScenarioTask::read(const TaskReading& reading) {
+  const SetupSection section = reading.target.open("SCENARIOS");
+  section.read(scenarioSection(), settings);
+  if (settings.type == ScenarioType::singleRun) return;
+  section.open("SCENARIO_RUNS")
+      .readItems("SCENARIO_", runSection(), settings.runs, "Error: No scenario runs defined",
+                 [&reading](const SetupSection& item, const ScenarioRun& run) {
+                   validateScenarioRun(run.values, reading.parameters, item);
+                 });
+}
+
+std::string ScenarioTask::description() const {
+  return settings.type == ScenarioType::singleRun ? "Scenario runs: Single run using initial parameter set"
+                                                  : "Scenario runs: Multiple runs";
+}
+
+int ScenarioTask::plannedEvaluations(std::size_t /*variableCount*/) const {
+  return settings.type == ScenarioType::singleRun ? 1 : static_cast<int>(settings.runs.size());
+}
+
+TaskOutcome ScenarioTask::run(const TaskContext& context) {
+  const std::vector<ParameterSet> sets = settings.type == ScenarioType::singleRun
+                                             ? std::vector<ParameterSet>{context.space.initial}
+                                             : scenarioSets(settings.runs, context.parameters);
+  context.evaluator.evaluateParameterSets(sets, DispatchMode::task);
+  return {std::string(kEndOfTask)};
+}
+
+std::vector<ParameterSet> scenarioSets(std::span<const ScenarioRun> runs, std::span<const ModelParameter> parameters) {
+  std::vector<ParameterSet> sets;
+  for (std::size_t run = 0; run < runs.size(); ++run) {
+    const std::vector<double>& values = runs[run].values;
+    ParameterSet set;
+    for (std::size_t i = 0; i < parameters.size(); ++i) {
+      const ModelParameter& parameter = parameters[i];
+      if (parameter.parameterType != ParameterType::variable) continue;
+      bool failed = i >= values.size();
+      if (!failed) {
+        set.push_back(TransformParameterValue(values[i], parameter.lowerBound, parameter.transformationType,
+                                              TransformDirection::forward, failed));
+      }
+      if (failed) {
+        fatalError("Error: Invalid parameter transformation for parameter " + parameter.name,
+                   fmt::format("Scenario run {} has {}.", run + 1,
+                               i < values.size() ? "the value " + formatReal(values[i]) + ", which has no logarithm"
+                                                 : "no value for it"));
+      }
+    }
+    sets.push_back(std::move(set));
+  }
+  return sets;
+}
+
+}  // namespace mirevo

@@ -1,0 +1,38 @@
+#pragma once
+
+#include "run/tasks/task.h"
+
+namespace mirevo {
+
+enum class ScenarioType : std::int32_t { singleRun = 0, multipleRuns = 1 };
+
+/// One run of the list.
+struct ScenarioRun {
+  std::vector<double> values;  ///< one per model parameter, model scale
+};
+
+struct ScenarioSettings {
+  ScenarioType type = ScenarioType::singleRun;
+  std::vector<ScenarioRun> runs;
+};
+
+/// Scenario runs: the initial parameter set alone, or a list of sets in one batch.
+class ScenarioTask final : public Task {
+ public:
+  const TaskFacts& facts() const override;
+  std::vector<const SectionRow*> sections() const override;
+  void read(const TaskReading& reading) override;
+  std::string description() const override;
+  int plannedEvaluations(std::size_t variableCount) const override;
+  TaskOutcome run(const TaskContext& context) override;
+
+  ScenarioSettings settings;
+};
+
+/// The parameter sets of the runs: of each run's values those of the variable parameters, transformed. Mapping them
+/// back yields the given values to within the rounding of exp(ln(x)) for a logarithmic parameter, exactly for an
+/// untransformed one, and the grid value for an integer one. Throws FatalError naming run and parameter where a value
+/// cannot be transformed.
+std::vector<ParameterSet> scenarioSets(std::span<const ScenarioRun> runs, std::span<const ModelParameter> parameters);
+
+}  // namespace mirevo

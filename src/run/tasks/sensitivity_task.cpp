@@ -1,0 +1,149 @@
+#include "run/tasks/sensitivity_task.h"
+
+#include <algorithm>
+#include <cmath>
+#include <limits>
+#include <utility>
+
+#include <fmt/format.h>
+
+#include "algorithms/analyses/covariance.h"
+#include "measures/period_series.h"
+#include "run/tasks/analysis_names.h"
+
+namespace mirevo {
+namespace {
+
+constexpr CodeName kTypeNames[] = {{0, "local"}};
+
+const SettingSection<SensitivityTask>& sensitivitySection() {
+  static const SettingSection<SensitivityTask> section{
+      {"SENSITIVITY_ANALYSIS",
+       "when `Option` is 1",
+       "Sensitivity analysis.",
+       {setting<&SensitivityTask::type>({.name = "Sensitivity_Type",
+                                         .range = between(0, 0),
+                                         .codes = kTypeNames,
+                                         .refusal = "Error: Invalid sensitivity type selection",
+                                         .meaning = "0 local sensitivity analysis."})}}};
+  return section;
+}
+
+/// That every parameter has room for its perturbation within its bounds.
+void validateLocalSensitivity(const SensitivitySettings& settings, std::span<const ModelParameter> parameters,
+                              const SetupSection& section) {
+  const SearchSpace space = BuildSearchSpace(parameters);
+  std::size_t j = 0;
+  for (const ModelParameter& parameter : parameters) {
+    // A perturbation that would leave the range is taken the other way, so that both must fail.
+    if (parameter.parameterType != ParameterType::variable || hasRoomForStep(settings, space, j++)) continue;
+    section.refuse(
+        fmt::format("Error: Perturbed value for parameter {} in local sensitivity analysis out of bounds",
+                    parameter.name),
+        "Perturbation_Fraction",
+        fmt::format("{} of the {}, from {}, leaves the bounds {} to {} both ways{}", settings.perturbationFraction,
+                    settings.perturbationOption == PerturbationOption::range ? "range" : "value",
+                    parameter.initialValue, parameter.lowerBound, parameter.upperBound,
+                    parameter.transformationType == TransformationType::logarithmic ? " (logarithms)" : ""));
+  }
+}
+
+/// What the covariance is computed from: one entry an observation, and one row of simulated values a set.
+struct ComparedValues {
+  std::vector<double> observed;  ///< NaN for an observation that does not count
+  std::vector<double> weights;
+  std::vector<std::vector<double>> simulated;  ///< empty for a set that failed
+};
+
+/// Every pair of series that an objective function is made of, once, however many measures compare it. An observation
+/// has the square of the weight that its measure gives to its difference: that is how it enters a sum of squares.
+ComparedValues compareSeries(const TaskContext& context, std::span<const EvaluationResult> results) {
+  const std::span<const OutputMeasure> measures = context.measures;
+  ComparedValues compared;
+  compared.simulated.resize(results.size());
+  std::vector<std::size_t> taken;
+  std::size_t first = 0;
+  for (const ObservedSeries& series : context.observedSeries) {
+    const std::size_t begin = std::exchange(first, first + series.values.size());
+    const bool counts =
+        std::any_of(context.objectives.begin(), context.objectives.end(), [&](const ObjectiveFunction& objective) {
+          return std::count(objective.measures.begin(), objective.measures.end(), series.measure) > 0;
+        });
+    const OutputMeasure& measure = measures[series.measure];
+    const bool isRepeated = std::any_of(taken.begin(), taken.end(),
+                                        [&](std::size_t other) { return isSamePair(measure, measures[other]); });
+    if (!counts || isRepeated) continue;
+    taken.push_back(series.measure);
+    for (std::size_t i = 0; i < results.size(); ++i) {
+      if (!results[i].ok()) continue;
+      const auto from = results[i].simulatedValues.begin() + static_cast<std::ptrdiff_t>(begin);
+      compared.simulated[i].insert(compared.simulated[i].end(), from,
+                                   from + static_cast<std::ptrdiff_t>(series.values.size()));
+    }
+    for (std::size_t t = 0; t < series.values.size(); ++t) {
+      const bool isAbove = results.front().ok() && results.front().simulatedValues[begin + t] > series.values[t];
+      const double weight = isAbove ? measure.weightAbove : measure.weight;
+      compared.observed.push_back(weight == 0.0 ? std::numeric_limits<double>::quiet_NaN() : series.values[t]);
+      compared.weights.push_back(weight * weight);
+    }
+  }
+  return compared;
+}
+
+std::vector<std::string> reportCovariance(const TaskContext& context, const LocalSensitivity& sensitivity) {
+  if (!sensitivity.results.front().ok()) {
+    return {"Warning: No covariance matrix: the model run with the initial values failed"};
+  }
+  ComparedValues compared = compareSeries(context, sensitivity.results);
+  if (compared.observed.empty()) {
+    return {"Warning: No covariance matrix: no objective function compares time series"};
+  }
+  const std::optional<LinearisedModel> model =
+      linearise(sensitivity.plan, compared.simulated, compared.observed, std::move(compared.weights));
+  if (!model) return {"Warning: No covariance matrix: the model run with the initial values failed"};
+  return formatCovariance(parameterCovariance(*model), context.space, sensitivity.plan.sets.front());
+}
+
+}  // namespace
+
+const TaskFacts& SensitivityTask::facts() const {
+  static constexpr TaskFacts kFacts{{1, "sensitivity"}, "_Sensitivity.dat"};
+  return kFacts;
+}
+
+std::vector<const SectionRow*> SensitivityTask::sections() const {
+  return {&sensitivitySection().row, &localSensitivitySection().row};
+}
+
+void SensitivityTask::read(const TaskReading& reading) {
+  const SetupSection section = reading.target.open("SENSITIVITY_ANALYSIS");
+  section.read(sensitivitySection(), *this);
+  const SetupSection local = section.open("LOCAL_SA");
+  local.read(localSensitivitySection(), settings);
+  validateLocalSensitivity(settings, reading.parameters, local);
+}
+
+std::string SensitivityTask::description() const {
+  return fmt::format("Sensitivity analysis: Local sensitivity analysis, {} differences",
+                     kDifferencingNames[settings.differencing == Differencing::central ? 1 : 0].name);
+}
+
+int SensitivityTask::plannedEvaluations(std::size_t variableCount) const {
+  const int perParameter = settings.differencing == Differencing::central ? 2 : 1;
+  return 1 + perParameter * static_cast<int>(variableCount);
+}
+
+TaskOutcome SensitivityTask::run(const TaskContext& context) {
+  TaskOutcome outcome{std::string(kEndOfTask)};
+  if (type != SensitivityType::local) return outcome;
+  const LocalSensitivity sensitivity = localSensitivity(settings, context.space, context.evaluator);
+  outcome.report = formatSensitivity(sensitivity, analysisNames(context));
+  if (settings.calculatesCovariance) {
+    outcome.report.emplace_back();
+    for (std::string& line : reportCovariance(context, sensitivity)) outcome.report.push_back(std::move(line));
+  }
+  logReport(context, outcome.report);
+  return outcome;
+}
+
+}  // namespace mirevo

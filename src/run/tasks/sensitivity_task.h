@@ -1,0 +1,26 @@
+#pragma once
+
+#include "algorithms/analyses/local_sensitivity.h"
+#include "run/tasks/task.h"
+
+namespace mirevo {
+
+enum class SensitivityType : std::int32_t { local = 0 };
+
+/// Local sensitivity analysis, with the covariance of the parameters where the setup asks for it.
+class SensitivityTask final : public Task {
+ public:
+  const TaskFacts& facts() const override;
+  std::vector<const SectionRow*> sections() const override;
+  void read(const TaskReading& reading) override;
+  std::string description() const override;
+  int plannedEvaluations(std::size_t variableCount) const override;
+  bool keepsSimulatedValues() const override { return settings.calculatesCovariance; }
+  TaskOutcome run(const TaskContext& context) override;
+  TaskReport report() const override { return {.sensitivity = &settings}; }
+
+  SensitivityType type = SensitivityType::local;
+  SensitivitySettings settings;
+};
+
+}  // namespace mirevo

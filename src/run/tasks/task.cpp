@@ -1,0 +1,13 @@
+#include "run/tasks/task.h"
+
+namespace mirevo {
+
+std::vector<std::string> Task::summaryLines(std::size_t /*variableCount*/) const {
+  return {};
+}
+
+std::optional<RaisedBudget> Task::raisedBudget(const SearchHistory& /*history*/) const {
+  return std::nullopt;
+}
+
+}  // namespace mirevo

@@ -1,0 +1,70 @@
+#include "run/tasks/uncertainty_task.h"
+
+#include <fmt/format.h>
+
+#include "algorithms/analyses/series_band.h"
+#include "run/tasks/analysis_names.h"
+
+namespace mirevo {
+namespace {
+
+/// The band of each series as a file, and a line each for the report.
+std::vector<std::string> reportBands(const TaskContext& context, std::span<const EvaluationResult> results,
+                                     std::vector<TaskFile>& files) {
+  std::vector<std::string> lines;
+  std::size_t first = 0;
+  for (const ObservedSeries& observed : context.observedSeries) {
+    const SeriesBand band = seriesBand(observed.values, results, first);
+    first += observed.values.size();
+    const std::string& name = context.measures[observed.measure].name;
+    files.push_back({fmt::format("{}_Band_{}.csv", context.filePrefix, observed.measure + 1),
+                     seriesBandText(name, observed, band)});
+    lines.push_back(band.observationCount == 0
+                        ? fmt::format("Band of {}: no observation has a simulated value", name)
+                        : fmt::format("Band of {}: {:.1f} % of {} observations lie between the 5 and the 95 % quantile",
+                                      name, 100.0 * band.shareInside, band.observationCount));
+    lines.push_back("   " + files.back().path);
+  }
+  return lines;
+}
+
+}  // namespace
+
+const TaskFacts& UncertaintyTask::facts() const {
+  static constexpr TaskFacts kFacts{{3, "uncertainty"}, ".dat"};
+  return kFacts;
+}
+
+std::vector<const SectionRow*> UncertaintyTask::sections() const {
+  return {&uncertaintySection().row, &distributionSection().row};
+}
+
+void UncertaintyTask::read(const TaskReading& reading) {
+  const SetupSection section = reading.target.open("UNCERTAINTY_ESTIMATION");
+  UncertaintySection filled{settings, randomSeed};
+  section.read(uncertaintySection(), filled);
+  for (std::size_t i = 0; i < reading.variableCount; ++i) {
+    const SetupSection item = section.openItem("PARAMETER_", i + 1);
+    item.read(distributionSection(), settings.parameters.emplace_back());
+  }
+}
+
+std::string UncertaintyTask::description() const {
+  return fmt::format("Uncertainty analysis: {} sampling",
+                     kSamplingTypeNames[settings.samplingType == SamplingType::latinHypercube ? 1 : 0].name);
+}
+
+TaskOutcome UncertaintyTask::run(const TaskContext& context) {
+  const UncertaintyOutcome found = uncertaintyAnalysis(settings, randomSeed, context.evaluator,
+                                                       [&](std::string_view text) { context.log.line(text); });
+  TaskOutcome outcome{std::string(kEndOfTask)};
+  outcome.report = formatUncertainty(summariseUncertainty(found), analysisNames(context));
+  logReport(context, outcome.report);
+  const std::vector<std::string> bands = reportBands(context, found.results, outcome.files);
+  logReport(context, bands);
+  outcome.report.emplace_back();
+  outcome.report.insert(outcome.report.end(), bands.begin(), bands.end());
+  return outcome;
+}
+
+}  // namespace mirevo

@@ -1,0 +1,24 @@
+#pragma once
+
+#include "algorithms/analyses/uncertainty.h"
+#include "run/tasks/task.h"
+
+namespace mirevo {
+
+/// Uncertainty analysis by sampling, with the band of every simulated series.
+class UncertaintyTask final : public Task {
+ public:
+  const TaskFacts& facts() const override;
+  std::vector<const SectionRow*> sections() const override;
+  void read(const TaskReading& reading) override;
+  std::string description() const override;
+  int plannedEvaluations(std::size_t /*variableCount*/) const override { return settings.sampleSize; }
+  bool drawsRandomNumbers() const override { return true; }
+  bool keepsSimulatedValues() const override { return true; }
+  TaskOutcome run(const TaskContext& context) override;
+  TaskReport report() const override { return {.hasBands = true}; }
+
+  UncertaintySettings settings;
+};
+
+}  // namespace mirevo
