@@ -6,10 +6,16 @@
 #include <string>
 #include <vector>
 
+#include "common/settings/code_name.h"
+
 namespace mirevo {
 
 enum class FunctionType : std::int32_t { sum = 0, sumOfAbsolutes = 1, sumOfSquares = 2 };
+inline constexpr CodeName kFunctionTypeNames[] = {{0, "sum"}, {1, "sum of absolute values"}, {2, "sum of squares"}};
+
 enum class AggregationMethod : std::int32_t { none = 0, commonDistance = 1, commonProbability = 2, zero = 3 };
+inline constexpr CodeName kAggregationMethodNames[] = {
+    {0, "none"}, {1, "common distance"}, {2, "common probability"}, {3, "zero"}};
 
 /// Combines output measures into one value and weighs it in the aggregate.
 struct ObjectiveFunction {

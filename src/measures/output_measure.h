@@ -4,10 +4,13 @@
 #include <string>
 
 #include "common/date_record.h"
+#include "common/settings/code_name.h"
 
 namespace mirevo {
 
 enum class InterfaceType : std::int32_t { timeSeries = 0, measureFile = 1 };
+inline constexpr CodeName kInterfaceTypeNames[] = {{0, "time series"}, {1, "measure file"}};
+
 enum class StatisticType : std::int32_t {
   mean = 0,
   rootMeanSquare = 1,

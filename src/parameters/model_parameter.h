@@ -4,10 +4,18 @@
 #include <string>
 #include <vector>
 
+#include "common/settings/code_name.h"
+
 namespace mirevo {
 
 enum class TransformationType : std::int32_t { none = 0, logarithmic = 1, integer = 2 };
+inline constexpr CodeName kTransformationTypeNames[] = {{0, "none"}, {1, "logarithmic"}, {2, "integer"}};
+
 enum class ParameterType : std::int32_t { variable = 0, fixed = 1, dependent = 2 };
+inline constexpr CodeName kParameterTypeNames[] = {{0, "variable"}, {1, "fixed"}, {2, "dependent"}};
+
+enum class LogicalOperator : std::int32_t { less = 0, lessOrEqual = 1, greater = 2, greaterOrEqual = 3 };
+inline constexpr CodeName kLogicalOperatorNames[] = {{0, "<"}, {1, "<="}, {2, ">"}, {3, ">="}};
 
 /// One parameter of the model as the setup describes it; values and bounds are on the model scale.
 struct ModelParameter {
@@ -27,7 +35,7 @@ struct ModelParameter {
 struct InternalConstraint {
   std::string leftEquation;
   std::string rightEquation;
-  std::int32_t logicalOperator = 0;  ///< 0 <, 1 <=, 2 >, 3 >=
+  LogicalOperator logicalOperator = LogicalOperator::less;
 };
 
 }  // namespace mirevo

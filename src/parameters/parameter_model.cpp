@@ -14,8 +14,6 @@
 namespace mirevo {
 namespace {
 
-constexpr std::string_view kOperatorSymbols[] = {"<", "<=", ">", ">="};
-
 std::vector<std::string> namesOf(std::span<const ModelParameter> parameters) {
   std::vector<std::string> names;
   names.reserve(parameters.size());
@@ -31,19 +29,18 @@ double valueOf(const CompiledExpression& expression, std::string_view equation) 
 
 }  // namespace
 
-bool CheckConstraint(double left, double right, std::int32_t logicalOperator) {
+bool CheckConstraint(double left, double right, LogicalOperator logicalOperator) {
   switch (logicalOperator) {
-    case 0:
+    case LogicalOperator::less:
       return left >= right;
-    case 1:
+    case LogicalOperator::lessOrEqual:
       return left > right;
-    case 2:
+    case LogicalOperator::greater:
       return left <= right;
-    case 3:
+    case LogicalOperator::greaterOrEqual:
       return left < right;
-    default:
-      return false;
   }
+  return false;
 }
 
 class ParameterModel::Implementation {
@@ -162,15 +159,14 @@ std::optional<ParameterFailure> ParameterModel::Implementation::checkConstraints
     const InternalConstraint& constraint = constraints_[c].constraint;
     const double left = valueOf(*constraints_[c].left, constraint.leftEquation);
     const double right = valueOf(*constraints_[c].right, constraint.rightEquation);
-    const bool knownOperator = constraint.logicalOperator >= 0 && constraint.logicalOperator <= 3;
+    const std::string_view symbol = codeName(kLogicalOperatorNames, constraint.logicalOperator);
     // A side that is not a number would satisfy every comparison; such a set is not run. Infinite sides are compared.
-    const bool undefined = knownOperator && (std::isnan(left) || std::isnan(right));
+    const bool undefined = !symbol.empty() && (std::isnan(left) || std::isnan(right));
     if (!undefined && !CheckConstraint(left, right, constraint.logicalOperator)) continue;
     return ParameterFailure{
         undefined ? ParameterFailure::Kind::equationNotFinite : ParameterFailure::Kind::constraintViolated,
         fmt::format("constraint {} ({} {} {}): left side {}, right side {}", c + 1, trim(constraint.leftEquation),
-                    kOperatorSymbols[constraint.logicalOperator], trim(constraint.rightEquation), formatReal(left),
-                    formatReal(right))};
+                    symbol, trim(constraint.rightEquation), formatReal(left), formatReal(right))};
   }
   return std::nullopt;
 }

@@ -1,6 +1,5 @@
 #pragma once
 
-#include <cstdint>
 #include <memory>
 #include <span>
 #include <string>
@@ -18,9 +17,8 @@ struct ParameterFailure {
   std::string detail;  ///< one line: which constraint or equation, with the values of its sides
 };
 
-/// Whether a constraint is violated by the values of its two equations (codes of InternalConstraint). A code outside
-/// 0..3 never reports a violation.
-bool CheckConstraint(double left, double right, std::int32_t logicalOperator);
+/// Whether a constraint is violated by the values of its two equations. A code outside 0..3 never reports a violation.
+bool CheckConstraint(double left, double right, LogicalOperator logicalOperator);
 
 /// All parameters of the model: the search space, the order of evaluation, the compiled equations and constraints.
 class ParameterModel final {

@@ -73,8 +73,8 @@ class EvaluationTest : public testing::Test {
     dependent.name = "inverse";
     dependent.parameterType = ParameterType::dependent;
     dependent.equation = "1 / (a - 5)";
-    parameters_ =
-        std::make_unique<ParameterModel>(std::vector{a, dependent}, std::vector<InternalConstraint>{{"a", "9", 0}});
+    parameters_ = std::make_unique<ParameterModel>(std::vector{a, dependent},
+                                                   std::vector<InternalConstraint>{{"a", "9", LogicalOperator::less}});
   }
 
   /// Five daily values from 2001-01-01 on.

@@ -110,7 +110,7 @@ TEST(ParameterModel, NamesWhatItRefuses) {
             "Error: Unable to create the expression 2 * Maning in equation parser\n"
             "equation of the dependent parameter \"d\"\ncolumn 5: no parameter is called \"Maning\"\n    2 * Maning\n"
             "        ^\ndid you mean \"Manning\"?");
-  EXPECT_THAT(refused({variable("a")}, {{"a", "1", 0}, {"a", "b +", 0}}),
+  EXPECT_THAT(refused({variable("a")}, {{"a", "1", {}}, {"a", "b +", {}}}),
               AllOf(StartsWith("Error: Invalid equation for internal constraints\n"),
                     HasSubstr("right equation of constraint 2\nError: Unable to create the expression b + "
                               "in equation parser\ncolumn 1: no parameter is called \"b\"")));
@@ -149,15 +149,20 @@ TEST(CheckConstraint, FollowsItsTable) {
   };
   for (const auto& c : cases) {
     for (int i = 0; i < 6; ++i) {
-      EXPECT_EQ(CheckConstraint(c.left, c.right, i == 5 ? -1 : i), c.violated[i]) << c.left << " operator " << i;
+      const auto logicalOperator = static_cast<LogicalOperator>(i == 5 ? -1 : i);
+      EXPECT_EQ(CheckConstraint(c.left, c.right, logicalOperator), c.violated[i]) << c.left << " operator " << i;
     }
   }
 }
 
 TEST(ParameterModel, SaysWhyASetIsNotRun) {
   using Kind = ParameterFailure::Kind;
+  using enum LogicalOperator;
   ParameterModel model({variable("a"), variable("b"), dependent("d", "ln(a)")},
-                       {{"a + b", "10", 0}, {"sqrt(b - 1)", "5", 1}, {"1 / (b - 2)", "1e300", 1}, {"a", "a", 7}});
+                       {{"a + b", "10", less},
+                        {"sqrt(b - 1)", "5", lessOrEqual},
+                        {"1 / (b - 2)", "1e300", lessOrEqual},
+                        {"a", "a", static_cast<LogicalOperator>(7)}});
   const struct {
     double a, b;
     Kind kind;

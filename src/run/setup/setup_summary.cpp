@@ -24,11 +24,6 @@ std::string_view transformationName(TransformationType type) {
   return "";
 }
 
-std::string_view operatorName(std::int32_t logicalOperator) {
-  constexpr std::string_view kNames[] = {"<", "<=", ">", ">="};
-  return logicalOperator >= 0 && logicalOperator <= 3 ? kNames[logicalOperator] : "?";
-}
-
 std::string_view functionTypeName(FunctionType type) {
   switch (type) {
     case FunctionType::sum:
@@ -65,8 +60,8 @@ class Summary final {
       line("  order of evaluation: {}", fmt::join(evaluationOrder, ", "));
     }
     for (const InternalConstraint& constraint : config_.constraints) {
-      line("  constraint: {} {} {}", constraint.leftEquation, operatorName(constraint.logicalOperator),
-           constraint.rightEquation);
+      line("  constraint: {} {} {}", constraint.leftEquation,
+           codeName(kLogicalOperatorNames, constraint.logicalOperator), constraint.rightEquation);
     }
   }
 

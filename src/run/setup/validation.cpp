@@ -71,7 +71,8 @@ void validateParameterDefinition(const ModelParameter& parameter, NamesUsed& nam
 }
 
 void validateLogicalOperator(const InternalConstraint& constraint, const SetupSection& section) {
-  section.check("Logical_Operator", constraint.logicalOperator, "Error: Invalid logical operator in " + section.name());
+  section.check("Logical_Operator", code(constraint.logicalOperator),
+                "Error: Invalid logical operator in " + section.name());
   for (const auto& [keyword, equation] :
        {std::pair{"Left_Equation", &constraint.leftEquation}, std::pair{"Right_Equation", &constraint.rightEquation}}) {
     if (trim(*equation).empty()) {
