@@ -43,7 +43,7 @@ void mapToModelValues(benchmark::State& state) {
   const std::vector<ModelParameter> parameters =
       chain(static_cast<std::size_t>(state.range(0)), static_cast<std::size_t>(state.range(1)));
   const std::string last = parameters.back().name;
-  ParameterModel model(parameters, {{last, "2", 0}});
+  ParameterModel model(parameters, {{last, "2", LogicalOperator::less}});
   const std::vector<double> set = model.searchSpace().initial;
   for (auto _ : state) benchmark::DoNotOptimize(model.MapToModelValues(set));
 }
