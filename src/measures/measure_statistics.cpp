@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <cmath>
-#include <limits>
 #include <span>
 #include <string>
 
@@ -12,6 +11,7 @@
 #include "common/fatal_error.h"
 #include "common/text.h"
 #include "measures/dates.h"
+#include "measures/statistics.h"
 
 namespace mirevo {
 namespace {
@@ -81,23 +81,21 @@ void forEachObservation(const SeriesItem& simulation, const SeriesItem& observat
   }
 }
 
-/// Mean, rms and standard deviation over the pairs in the period. Single precision, in observation order: deliberate.
-void addPairStatistics(const SeriesItem& simulation, const SeriesItem& observation, const EvaluationPeriod& period,
-                       float weight, float weightAbove, MeasureStatistics& statistics) {
-  float sum = 0.0F;
-  float sumOfSquares = 0.0F;
+/// The pairs in the period, and what is said of the observations without a simulated value.
+MeasureStatistics collectPairs(const SeriesItem& simulation, const SeriesItem& observation,
+                               const EvaluationPeriod& period) {
+  MeasureStatistics statistics;
   std::optional<double> firstUnused;
   forEachObservation(simulation, observation, period,
                      [&](double time, float observed, const std::optional<float>& simulated) {
                        ++statistics.observationCount;
-                       if (!simulated) {
-                         if (!firstUnused) firstUnused = time;
-                         return true;
+                       if (simulated) {
+                         statistics.times.push_back(time);
+                         statistics.simulatedValues.push_back(*simulated);
+                         statistics.observedValues.push_back(observed);
+                       } else if (!firstUnused) {
+                         firstUnused = time;
                        }
-                       statistics.simulatedValues.push_back(*simulated);
-                       const float e = weightedDifference(*simulated, observed, weight, weightAbove);
-                       sum += e;
-                       sumOfSquares += e * e;
                        return true;
                      });
   if (statistics.simulatedValues.empty()) {
@@ -109,6 +107,19 @@ void addPairStatistics(const SeriesItem& simulation, const SeriesItem& observati
   if (firstUnused) {
     constexpr double kDaySeconds = 86400.0;
     statistics.firstUnused = dateOfSecond(secondNumber(simulation.start) + std::llround(*firstUnused * kDaySeconds));
+  }
+  return statistics;
+}
+
+/// Mean, rms and standard deviation over the pairs. Single precision, in observation order: deliberate.
+void addDifferenceStatistics(float weight, float weightAbove, MeasureStatistics& statistics) {
+  float sum = 0.0F;
+  float sumOfSquares = 0.0F;
+  for (std::size_t i = 0; i < statistics.simulatedValues.size(); ++i) {
+    const float e =
+        weightedDifference(statistics.simulatedValues[i], statistics.observedValues[i], weight, weightAbove);
+    sum += e;
+    sumOfSquares += e * e;
   }
   const auto n = static_cast<float>(statistics.simulatedValues.size());
   statistics.mean = sum / n;
@@ -168,18 +179,17 @@ MeasureStatistics computeMeasureStatistics(const OutputMeasure& measure, const E
                                            float weightAbove, bool wantPeaks) {
   const SeriesItem simulated = readItem(simulation, measure.simulation);
   const SeriesItem observed = readItem(observation, measure.observation);
-  MeasureStatistics statistics;
-  addPairStatistics(simulated, observed, period, weight, weightAbove, statistics);
+  MeasureStatistics statistics = collectPairs(simulated, observed, period);
+  addDifferenceStatistics(weight, weightAbove, statistics);
   if (wantPeaks) addPeakStatistics(simulated, observed, period, weight, weightAbove, statistics);
   return statistics;
 }
 
 MeasureStatistics computeMeasureStatistics(const OutputMeasure& measure, const EvaluationPeriod& period,
                                            TimeSeriesObject& simulation, TimeSeriesObject& observation) {
-  const bool wantPeaks =
-      measure.statisticType == StatisticType::peakDifference || measure.statisticType == StatisticType::lowDifference;
   return computeMeasureStatistics(measure, period, simulation, observation, static_cast<float>(measure.weight),
-                                  static_cast<float>(measure.weightAbove), wantPeaks);
+                                  static_cast<float>(measure.weightAbove),
+                                  statisticOf(measure.statisticType).needsPeaks);
 }
 
 bool hasPairs(const OutputMeasure& measure, const EvaluationPeriod& period, TimeSeriesObject& simulation,
@@ -194,19 +204,8 @@ bool hasPairs(const OutputMeasure& measure, const EvaluationPeriod& period, Time
 }
 
 double selectStatistic(const MeasureStatistics& statistics, StatisticType type) {
-  switch (type) {
-    case StatisticType::mean:
-      return statistics.mean;
-    case StatisticType::rootMeanSquare:
-      return statistics.rootMeanSquare;
-    case StatisticType::standardDeviation:
-      return statistics.standardDeviation;
-    case StatisticType::peakDifference:
-      return statistics.peakDifference;
-    case StatisticType::lowDifference:
-      return statistics.lowDifference;
-  }
-  return std::numeric_limits<double>::quiet_NaN();
+  const Statistic& statistic = statisticOf(type);
+  return statistic.inObjective(statistic.value(statistics));
 }
 
 double measureValue(const OutputMeasure& measure, const EvaluationPeriod& period, TimeSeriesObject& simulation,

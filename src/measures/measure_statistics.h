@@ -10,14 +10,17 @@
 
 namespace mirevo {
 
-/// The five statistics of one measure. Single precision throughout is deliberate.
+/// What the statistics of one measure are taken from: the pairs of a simulated and an observed value, and five figures
+/// that are computed together, deliberately in single precision throughout.
 struct MeasureStatistics {
   float mean = 0.0F;
   float rootMeanSquare = 0.0F;
   float standardDeviation = 0.0F;
   float peakDifference = 0.0F;
   float lowDifference = 0.0F;
-  std::vector<float> simulatedValues;     ///< at the observation times that were used
+  std::vector<double> times;              ///< of the pairs, in days since the start of the simulated file
+  std::vector<float> simulatedValues;     ///< one per pair
+  std::vector<float> observedValues;      ///< one per pair
   std::size_t observationCount = 0;       ///< in the period and not missing, used or not
   std::optional<DateRecord> firstUnused;  ///< time of the first of them without a simulated value
 };
@@ -28,13 +31,13 @@ void requireItem(TimeSeriesObject& series, const SeriesReference& reference);
 
 /// Statistics of simulated minus observed values, weighted: `weight` times the difference where it is not positive,
 /// `weightAbove` times it where it is. Both ends of the period belong to it. Observations that are missing, and those
-/// at whose time there is no simulated value, do not count. The peaks and lows only where `wantPeaks`. The two files
-/// may start at different times; equal civil times meet exactly. Throws FatalError with the fixed texts.
+/// at whose time there is no simulated value, do not count. The peak and low difference only where `wantPeaks`. The two
+/// files may start at different times; equal civil times meet exactly. Throws FatalError with the fixed texts.
 MeasureStatistics computeMeasureStatistics(const OutputMeasure& measure, const EvaluationPeriod& period,
                                            TimeSeriesObject& simulation, TimeSeriesObject& observation, float weight,
                                            float weightAbove, bool wantPeaks);
 
-/// The same with the measure's own weights, and the peaks where its `Statistic_Type` asks for them.
+/// The same with the measure's own weights, and with the peak and low difference where its statistic needs them.
 MeasureStatistics computeMeasureStatistics(const OutputMeasure& measure, const EvaluationPeriod& period,
                                            TimeSeriesObject& simulation, TimeSeriesObject& observation);
 
@@ -43,10 +46,10 @@ MeasureStatistics computeMeasureStatistics(const OutputMeasure& measure, const E
 bool hasPairs(const OutputMeasure& measure, const EvaluationPeriod& period, TimeSeriesObject& simulation,
               TimeSeriesObject& observation);
 
-/// The statistic that a `Statistic_Type` selects.
+/// What the statistic that a `Statistic_Type` selects is in an objective function.
 double selectStatistic(const MeasureStatistics& statistics, StatisticType type);
 
-/// The value of a measure of interface type 0: the statistic that its `Statistic_Type` selects.
+/// The value of a measure of interface type 0, as selectStatistic() has it.
 double measureValue(const OutputMeasure& measure, const EvaluationPeriod& period, TimeSeriesObject& simulation,
                     TimeSeriesObject& observation);
 

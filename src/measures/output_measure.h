@@ -11,6 +11,7 @@ namespace mirevo {
 enum class InterfaceType : std::int32_t { timeSeries = 0, measureFile = 1 };
 inline constexpr CodeName kInterfaceTypeNames[] = {{0, "time series"}, {1, "measure file"}};
 
+/// A statistic by its place in their table (measures/statistics.h); the first ones have it as their code, too.
 enum class StatisticType : std::int32_t {
   mean = 0,
   rootMeanSquare = 1,
@@ -18,9 +19,6 @@ enum class StatisticType : std::int32_t {
   peakDifference = 3,
   lowDifference = 4
 };
-
-inline constexpr CodeName kStatisticTypeNames[] = {
-    {0, "mean"}, {1, "root mean square"}, {2, "standard deviation"}, {3, "peak difference"}, {4, "low difference"}};
 
 /// One item of a time-series file.
 struct SeriesReference {

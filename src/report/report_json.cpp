@@ -6,7 +6,7 @@
 #include <fmt/format.h>
 
 #include "common/calendar.h"
-#include "report/fit_figures.h"
+#include "measures/fit_figures.h"
 #include "report/json_writer.h"
 #include "report/thinning.h"
 

@@ -1,6 +1,9 @@
 #include "measures/measure_statistics.h"
 
+#include <array>
+#include <bit>
 #include <cmath>
+#include <cstdint>
 #include <functional>
 
 #include <gmock/gmock.h>
@@ -37,48 +40,48 @@ MemoryTimeSeries daily(std::vector<float> values, DateRecord start = {2001, 1, 1
   return MemoryTimeSeries(start, std::move(times), {std::move(values)}, kGap);
 }
 
-TEST(MeasureStatistics, WorkedExampleInSinglePrecision) {
-  // Differences 0.1 (above), -0.3 (below), 0: weighted 2 * 0.1 and 0.5 * -0.3, each operation rounded to 32 bits.
-  MemoryTimeSeries simulation = daily({1.1F, 1.7F, 3.0F});
-  MemoryTimeSeries observation = daily({1.0F, 2.0F, 3.0F});
-  const MeasureStatistics s = computeMeasureStatistics(measure(), kJanuary, simulation, observation, 0.5F, 2.0F, true);
-  // 1.1f - 1 is 0.10000002384185791 and 1.7f - 2 is -0.2999999523162842; doubled and halved they stay exact.
-  const float e1 = 0.20000004768371582F;
-  const float e2 = -0.1499999761581421F;
-  EXPECT_EQ(s.mean, 0.016666690508524577F);
-  EXPECT_FLOAT_EQ(s.mean, (e1 + e2) / 3.0F);
-  EXPECT_EQ(s.rootMeanSquare, std::sqrt((e1 * e1 + e2 * e2) / 3.0F));
-  EXPECT_EQ(s.standardDeviation, std::sqrt(s.rootMeanSquare * s.rootMeanSquare - s.mean * s.mean));
-  EXPECT_EQ(s.peakDifference, 0.0F);
-  EXPECT_EQ(s.lowDifference, e1);
-  EXPECT_THAT(s.simulatedValues, ElementsAre(1.1F, 1.7F, 3.0F));
-}
+using Figures = std::array<float, 5>;  // in the order of their codes
 
-TEST(MeasureStatistics, AccumulationIsSinglePrecisionOnPurpose) {
-  // 2^24 + 1 is 2^24 in 32 bits: the two differences of 1 after the large one are lost.
-  MemoryTimeSeries simulation = daily({16777216.0F, 1.0F, 1.0F, 0.0F});
-  MemoryTimeSeries observation = daily({0.0F, 0.0F, 0.0F, 0.0F});
-  const MeasureStatistics s = computeMeasureStatistics(measure(), kJanuary, simulation, observation, 1.0F, 1.0F, false);
-  EXPECT_EQ(s.mean, 4194304.0F);
-  EXPECT_EQ(s.rootMeanSquare, 8388608.0F);
-}
-
-TEST(MeasureStatistics, EqualDifferencesKeepTheirRoundedVariance) {
-  // Ten differences of 0.1: summed in 32 bits they give 1.0000001, their squares 0.1 (rounded up), and v = rms² - mean²
-  // is a tiny number that is returned as it is, negative ones included.
-  bool negativeSeen = false;
-  for (int n = 1; n <= 31; ++n) {
-    for (const float d : {0.1F, 0.3F, 0.7F, 1.1F}) {
-      MemoryTimeSeries simulation = daily(std::vector<float>(static_cast<std::size_t>(n), d));
-      MemoryTimeSeries observation = daily(std::vector<float>(static_cast<std::size_t>(n), 0.0F));
-      const MeasureStatistics s =
-          computeMeasureStatistics(measure(), kJanuary, simulation, observation, 1.0F, 1.0F, false);
-      const float v = s.rootMeanSquare * s.rootMeanSquare - s.mean * s.mean;
-      EXPECT_EQ(s.standardDeviation, v > 0.0F ? std::sqrt(v) : v) << n << " times " << d;
-      negativeSeen = negativeSeen || s.standardDeviation < 0.0F;
-    }
+/// Of daily series, the simulated one from that day of January on.
+void expectBits(const char* name, std::vector<float> simulated, std::vector<float> observed, double weight,
+                double weightAbove, Figures expected, int firstSimulatedDay = 1) {
+  MemoryTimeSeries simulation = daily(std::move(simulated), {2001, 1, firstSimulatedDay});
+  MemoryTimeSeries observation = daily(std::move(observed));
+  OutputMeasure m = measure();
+  m.weight = weight;
+  m.weightAbove = weightAbove;
+  for (std::size_t code = 0; code < expected.size(); ++code) {
+    m.statisticType = static_cast<StatisticType>(code);
+    const auto value = static_cast<float>(measureValue(m, kJanuary, simulation, observation));
+    EXPECT_EQ(std::bit_cast<std::uint32_t>(value), std::bit_cast<std::uint32_t>(expected[code]))
+        << name << ", statistic " << code << ": " << value << ", expected " << expected[code];
   }
-  EXPECT_TRUE(negativeSeen);
+}
+
+// The figures were computed apart from the program, every operation rounded to 32 bits, the differences added in order.
+TEST(MeasureStatistics, AreTheSameBitsAsEver) {
+  expectBits("differences on both sides", {1.1F, 1.7F, 3}, {1, 2, 3}, 0.5, 2,
+             {0.0166666899F, 0.14433758F, 0.143372104F, 0, 0.200000048F});
+  expectBits("weights that 32 bits round", {1.1F, 1.7F, 3, 9.3F}, {1, 2, 3.3F, 9.3F}, 0.1, 0.3,
+             {-0.00749999564F, 0.0259807631F, 0.0248746891F, 0, 0.0300000086F});
+  expectBits("only what is too low", {3, 1, 5, 2}, {2, 2, 2, 2}, 1, 0, {-0.25F, 0.5F, 0.433012694F, 0, -1});
+  expectBits("no weight below", {1, 1.5F}, {2, 2}, 0, 1, {0, 0, 0, -0.0F, -0.0F});
+  expectBits("one pair", {0.7F}, {0.1F}, 1, 1, {0.599999964F, 0.599999964F, 0, 0.599999964F, 0.599999964F});
+  expectBits("zeros", {0, 0, 0}, {0, 0, 0}, 1, 1, {0, 0, 0, 0, 0});
+  expectBits("the large value first", {16777216, 1, 1, 0}, {0, 0, 0, 0}, 1, 1,
+             {4194304, 8388608, 7264747.5F, 16777216, 0});
+  expectBits("the large value last", {1, 1, 0, 16777216}, {0, 0, 0, 0}, 1, 1,
+             {4194304.5F, 8388608, 7264747.5F, 16777216, 0});
+  expectBits("differences that cancel", {100000000, -100000000, 0.1F, 0.2F}, {0, 0, 0, 0}, 1, 1,
+             {0.075000003F, 70710680, 70710680, 100000000, -100000000});
+  expectBits("variance below 0", {0.1F, 0.1F, 0.1F, 0.1F, 0.1F, 0.1F, 0.1F}, {0, 0, 0, 0, 0, 0, 0}, 1, 1,
+             {0.100000009F, 0.100000001F, -9.31322575e-10F, 0.100000001F, 0.100000001F});
+  expectBits("variance above 0", {0.3F, 0.3F, 0.3F, 0.3F, 0.3F, 0.3F}, {0, 0, 0, 0, 0, 0}, 1, 1,
+             {0.299999982F, 0.300000012F, 0.000122070312F, 0.300000012F, 0.300000012F});
+  expectBits("gaps", {1.3F, kGap, 2.2F, 9.1F, kGap, 0.4F}, {1.1F, 8, kGap, 7.7F, -3, 0.9F}, 1.5, 0.7,
+             {0.123333476F, 0.717054307F, 0.706368029F, 0.770000279F, 2.38000011F});
+  expectBits("simulated from the second day on", {2, 9, 3, 5}, {90, 1, 7, kGap, 4, -90}, 1, 10,
+             {13.333333F, 14.1421356F, 4.714046F, 20, 10}, 2);
 }
 
 TEST(MeasureStatistics, UsesTheObservationsThatCount) {
@@ -89,6 +92,7 @@ TEST(MeasureStatistics, UsesTheObservationsThatCount) {
     DateRecord simulationStart;
     EvaluationPeriod period;
     std::vector<float> used;
+    std::vector<double> times;  // of these, in days since the simulation's start
   };
   const Case cases[] = {
       {"both ends of the period",
@@ -96,12 +100,19 @@ TEST(MeasureStatistics, UsesTheObservationsThatCount) {
        {0, 0, 0, 0, 0},
        {2001, 1, 1},
        {{2001, 1, 2}, {2001, 1, 4}},
-       {2, 3, 4}},
-      {"a period that ends at 24:00", {1, 2, 3}, {0, 0, 0}, {2001, 1, 1}, {{2001, 1, 1}, {2001, 1, 1, 24, 0}}, {1, 2}},
-      {"missing observations", {1, 2, 3}, {kGap, nan, 0}, {2001, 1, 1}, kJanuary, {3}},
-      {"missing simulated values", {1, kGap, 3}, {0, 0, 0}, {2001, 1, 1}, kJanuary, {1, 3}},
-      {"a simulation that starts later", {5, 6}, {0, 0, 0, 0}, {2001, 1, 2}, kJanuary, {5, 6}},
-      {"a simulation that starts in between", {5, 7}, {0, 0, 0}, {2000, 12, 31, 12, 0}, kJanuary, {6}},
+       {2, 3, 4},
+       {1, 2, 3}},
+      {"a period that ends at 24:00",
+       {1, 2, 3},
+       {0, 0, 0},
+       {2001, 1, 1},
+       {{2001, 1, 1}, {2001, 1, 1, 24, 0}},
+       {1, 2},
+       {0, 1}},
+      {"missing observations", {1, 2, 3}, {kGap, nan, 0}, {2001, 1, 1}, kJanuary, {3}, {2}},
+      {"missing simulated values", {1, kGap, 3}, {0, 0, 0}, {2001, 1, 1}, kJanuary, {1, 3}, {0, 2}},
+      {"a simulation that starts later", {5, 6}, {0, 0, 0, 0}, {2001, 1, 2}, kJanuary, {5, 6}, {0, 1}},
+      {"a simulation that starts in between", {5, 7}, {0, 0, 0}, {2000, 12, 31, 12, 0}, kJanuary, {6}, {0.5}},
   };
   for (const Case& c : cases) {
     SCOPED_TRACE(c.name);
@@ -110,39 +121,9 @@ TEST(MeasureStatistics, UsesTheObservationsThatCount) {
     const MeasureStatistics s =
         computeMeasureStatistics(measure(), c.period, simulation, observation, 1.0F, 1.0F, false);
     EXPECT_EQ(s.simulatedValues, c.used);
+    EXPECT_EQ(s.times, c.times);
     EXPECT_EQ(s.peakDifference, 0.0F);
   }
-}
-
-TEST(MeasureStatistics, WeightsBySideAndSelectsByType) {
-  MemoryTimeSeries simulation = daily({3, 1, 5, 2});
-  MemoryTimeSeries observation = daily({2, 2, 2, 2});
-  OutputMeasure m = measure();
-  m.weightAbove = 0.0;  // of the differences 1, -1, 3, 0 only -1 is left, but all four count
-  const std::pair<StatisticType, double> expected[] = {
-      {StatisticType::mean, -0.25},
-      {StatisticType::rootMeanSquare, 0.5},
-      {StatisticType::standardDeviation, std::sqrt(0.25F - 0.0625F)},
-      {StatisticType::peakDifference, 0.0},
-      {StatisticType::lowDifference, -1.0},
-  };
-  for (const auto& [statistic, value] : expected) {
-    m.statisticType = statistic;
-    EXPECT_EQ(measureValue(m, kJanuary, simulation, observation), value) << static_cast<int>(statistic);
-  }
-  MemoryTimeSeries perfect = daily({2, 2, 2, 2});
-  for (const auto& [statistic, value] : expected) {
-    m.statisticType = statistic;
-    EXPECT_EQ(measureValue(m, kJanuary, perfect, observation), 0.0);
-  }
-}
-
-TEST(MeasureStatistics, PeaksAreThoseWithinTheSimulatedTimeSpan) {
-  MemoryTimeSeries observation = daily({90, 1, 7, kGap, 4, -90});
-  MemoryTimeSeries simulation = daily({2, 9, 3, 5}, {2001, 1, 2});
-  const MeasureStatistics s = computeMeasureStatistics(measure(), kJanuary, simulation, observation, 1.0F, 10.0F, true);
-  EXPECT_EQ(s.peakDifference, 20.0F);  // 9 over 7
-  EXPECT_EQ(s.lowDifference, 10.0F);   // 2 over 1
 }
 
 TEST(MeasureStatistics, AxesThatStartAtDifferentTimesMeetWithoutRounding) {

@@ -4,6 +4,7 @@
 
 #include <fmt/format.h>
 
+#include "measures/statistics.h"
 #include "run/setup/validation.h"
 
 namespace mirevo {
@@ -231,11 +232,16 @@ const SettingSection<OutputMeasure>& measureSection() {
                               .meaning = "Which number of the output-measure file; used with interface type 1.",
                               .checkOrder = 1}),
                          [](const Measure& measure) { return validateMeasurementNumber(measure); }),
-        setting<&Measure::statisticType>(
+        choice<Measure>(
+            [](Measure& measure, const SetupValue& value) {
+              const auto* code = std::get_if<std::int32_t>(&value);
+              measure.statisticType =
+                  code != nullptr ? StatisticType{*code} : findStatistic(std::get<std::string>(value)).value();
+            },
             {.name = "Statistic_Type",
              .defaultValue = "0",
              .range = between(0, 4),
-             .codes = kStatisticTypeNames,
+             .codes = statisticNames(),
              .refusal = "Error: Statistic type invalid for output measure ",
              .meaning = "Of the weighted differences simulated minus observed: 0 mean, 1 root mean square, 2 standard "
                         "deviation; weighted difference of 3 the largest, 4 the smallest values."}),

@@ -6,6 +6,7 @@
 #include <fmt/format.h>
 
 #include "common/text.h"
+#include "measures/statistics.h"
 #include "platform/kdx/kdx.h"
 
 namespace mirevo {
@@ -79,19 +80,7 @@ class Summary final {
 
 std::string_view statisticName(const OutputMeasure& measure) {
   if (measure.interfaceType == InterfaceType::measureFile) return "written by the model";
-  switch (measure.statisticType) {
-    case StatisticType::mean:
-      return "mean";
-    case StatisticType::rootMeanSquare:
-      return "root mean square";
-    case StatisticType::standardDeviation:
-      return "standard deviation";
-    case StatisticType::peakDifference:
-      return "difference of the largest values";
-    case StatisticType::lowDifference:
-      return "difference of the smallest values";
-  }
-  return "";
+  return statisticOf(measure.statisticType).description;
 }
 
 std::string setupSummary(const RunConfig& config, const SearchSpace& space, std::span<const int> evaluationOrder) {

@@ -1,4 +1,4 @@
-#include "report/fit_figures.h"
+#include "measures/fit_figures.h"
 
 #include <cmath>
 #include <limits>
