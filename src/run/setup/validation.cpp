@@ -7,6 +7,7 @@
 
 #include "algorithms/analyses/local_sensitivity.h"
 #include "algorithms/surrogate/quadratic_surrogate.h"
+#include "common/calendar.h"
 #include "common/fatal_error.h"
 #include "common/text.h"
 #include "measures/dates.h"
@@ -85,9 +86,8 @@ void validateEvaluationPeriod(const EvaluationPeriod& period, const SetupSection
   validateDate(period.start, "Start_Date", section);
   validateDate(period.end, "End_Date", section);
   if (daysSince(period.start, period.end) < 0.0) {
-    section.refuse(
-        "Error: End date of the evaluation period before its start date", "End_Date",
-        fmt::format("expected {} or later, found {}", formatKdxDate(period.start), formatKdxDate(period.end)));
+    section.refuse("Error: End date of the evaluation period before its start date", "End_Date",
+                   fmt::format("expected {} or later, found {}", formatDate(period.start), formatDate(period.end)));
   }
 }
 
