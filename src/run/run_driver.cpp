@@ -10,14 +10,15 @@
 #include "common/clock.h"
 #include "common/fatal_error.h"
 #include "common/files.h"
+#include "common/progress_messages.h"
 #include "common/text.h"
 #include "common/version.h"
 #include "evaluation/local_evaluator.h"
 #include "evaluation/ranks/mpi_evaluator.h"
 #include "measures/period_series.h"
 #include "platform/processes/posix_process_launcher.h"
-#include "platform/terminal/front_end.h"
 #include "platform/signals/signal_state.h"
+#include "platform/terminal/front_end.h"
 #include "report/run_report.h"
 #include "run/run_model.h"
 #include "run/setup/setup_reader.h"
@@ -31,7 +32,7 @@
 namespace mirevo {
 namespace {
 
-constexpr std::string_view kNormalTermination = "Normal termination";
+using progress::kNormalTermination;
 /// For all workers to have ended their models, which may take a grace time and a kill.
 constexpr double kWorkerStopSeconds = 20.0;
 /// At the end of a task, when a worker that was not needed may still be copying a large base folder.
@@ -64,7 +65,7 @@ int RunDriver::run(const std::string& setupFileName) {
     openResults();
     // Not before earlier results have been renamed: where they lie in the base folder, workers look at them.
     if (state_.mpiInUse) beginWorkers(state_.mpi, {config_.setupFile, setupText});
-    state_.progress.writeMessage("Title: " + config_.title);
+    state_.progress.writeMessage(std::string(progress::kTitle) + config_.title);
     state_.progress.writeStatus(taskName(config_));
     state_.progress.progressEvaluationLabel(config_.plannedModelRuns());
     finish(runTask({config_, parameters_->searchSpace(), *evaluator_, state_.log,
@@ -124,7 +125,7 @@ void RunDriver::openRun(const std::string& setupFileName) {
       showMessage(problem, {}, MessageType::warning);
     }
   }
-  state_.progress.progressStart(fmt::format("{} on {}, process {}", dateAndTimeWithZone(), hostName(), ::getpid()));
+  state_.progress.progressStart(dateAndTimeWithZone(), hostName(), ::getpid());
 }
 
 void RunDriver::buildModel() {

@@ -4,6 +4,7 @@
 
 #include "algorithms/numbers/uniform_generator.h"
 #include "common/fatal_error.h"
+#include "common/progress_messages.h"
 #include "common/text.h"
 #include "run/tasks/analysis_tasks.h"
 #include "run/tasks/search_factory.h"
@@ -11,7 +12,7 @@
 namespace mirevo {
 namespace {
 
-constexpr std::string_view kEndOfTask = "Normal termination";
+constexpr std::string_view kEndOfTask = progress::kNormalTermination;
 
 void logValues(RunLog& log, std::string_view heading, std::span<const std::string> names,
                std::span<const double> values) {
