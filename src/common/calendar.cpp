@@ -2,27 +2,22 @@
 
 #include <fmt/format.h>
 
+#include "common/take_text.h"
+
 namespace mirevo {
 
 DateRecord dateOfSecond(std::int64_t second) {
-  constexpr std::int64_t kDaySeconds = 86400;
-  constexpr std::int64_t kEraDays = 146097;  // 400 years
-  const std::int64_t day = (second >= 0 ? second : second - kDaySeconds + 1) / kDaySeconds;
-  const auto secondOfDay = static_cast<std::int32_t>(second - day * kDaySeconds);
-  const std::int64_t era = (day >= 0 ? day : day - kEraDays + 1) / kEraDays;
-  const std::int64_t dayOfEra = day - era * kEraDays;
-  const std::int64_t yearOfEra = (dayOfEra - dayOfEra / 1460 + dayOfEra / 36524 - dayOfEra / 146096) / 365;
-  const std::int64_t dayOfYear = dayOfEra - (365 * yearOfEra + yearOfEra / 4 - yearOfEra / 100);
-  const std::int64_t monthFromMarch = (5 * dayOfYear + 2) / 153;
-  const auto month = static_cast<std::int32_t>(monthFromMarch < 10 ? monthFromMarch + 3 : monthFromMarch - 9);
-  DateRecord date{};
-  date[date_field::kYear] = static_cast<std::int32_t>(yearOfEra + era * 400 + (month <= 2 ? 1 : 0));
-  date[date_field::kMonth] = month;
-  date[date_field::kDay] = static_cast<std::int32_t>(dayOfYear - (153 * monthFromMarch + 2) / 5 + 1);
-  date[date_field::kHour] = secondOfDay / 3600;
-  date[date_field::kMinute] = secondOfDay / 60 % 60;
-  date[date_field::kSecond] = secondOfDay % 60;
-  return date;
+  using namespace std::chrono;
+  const auto day = floor<days>(seconds(second));
+  const auto cycles = floor<CalendarCycles>(day);
+  const year_month_day date(kFirstDay + (day - cycles));
+  const hh_mm_ss time(seconds(second) - day);
+  return {static_cast<std::int32_t>(400 * cycles.count() + int{date.year()}),
+          static_cast<std::int32_t>(unsigned{date.month()}),
+          static_cast<std::int32_t>(unsigned{date.day()}),
+          static_cast<std::int32_t>(time.hours().count()),
+          static_cast<std::int32_t>(time.minutes().count()),
+          static_cast<std::int32_t>(time.seconds().count())};
 }
 
 std::string formatDate(const DateRecord& date) {
@@ -31,6 +26,24 @@ std::string formatDate(const DateRecord& date) {
       fmt::format("{:04}-{:02}-{:02} {:02}:{:02}", date[kYear], date[kMonth], date[kDay], date[kHour], date[kMinute]);
   if (date[kSecond] != 0) text += fmt::format(":{:02}", date[kSecond]);
   return text;
+}
+
+std::string isoTime(std::int64_t second) {
+  using namespace date_field;
+  const DateRecord date = dateOfSecond(second);
+  return fmt::format("{:04}-{:02}-{:02}T{:02}:{:02}:{:02}", date[kYear], date[kMonth], date[kDay], date[kHour],
+                     date[kMinute], date[kSecond]);
+}
+
+std::optional<DateRecord> takeDay(std::string_view& text, std::size_t leastYearDigits) {
+  const auto year = takeNumber(text, leastYearDigits, 4);
+  if (!year || !takeText(text, "-")) return std::nullopt;
+  const auto month = takeNumber(text, 1, 2);
+  if (!month || !takeText(text, "-")) return std::nullopt;
+  const auto day = takeNumber(text, 1, 2);
+  if (!day) return std::nullopt;
+  return DateRecord{static_cast<std::int32_t>(*year), static_cast<std::int32_t>(*month),
+                    static_cast<std::int32_t>(*day)};
 }
 
 }  // namespace mirevo

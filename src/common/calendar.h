@@ -1,22 +1,27 @@
 #pragma once
 
-#include <array>
+#include <chrono>
 #include <cstdint>
+#include <optional>
 #include <string>
+#include <string_view>
 
 #include "common/date_record.h"
 
 namespace mirevo {
 
-/// Gregorian, in every year: divisible by 4, and either not by 100 or by 400.
-constexpr bool isLeapYear(std::int64_t year) {
-  return year % 4 == 0 && (year % 100 != 0 || year % 400 == 0);
-}
+/// The 400 years after which the Gregorian calendar repeats. The years of std::chrono end at 32767; dates are looked up
+/// in the first of these cycles, so that every year has its days.
+using CalendarCycles =
+    std::chrono::duration<std::int64_t, std::ratio_multiply<std::ratio<400>, std::chrono::years::period>>;
 
-/// Days in a month (1 to 12) of a year.
+/// Where days and seconds are counted from.
+inline constexpr std::chrono::sys_days kFirstDay{std::chrono::year(0) / std::chrono::March / 1};
+
+/// Days in a month (1 to 12) of a year of the Gregorian calendar.
 constexpr int daysInMonth(std::int64_t year, int month) {
-  constexpr std::array<int, 12> kDays{31, 28, 31, 30, 31, 30, 31, 31, 30, 31, 30, 31};
-  return month == 2 && isLeapYear(year) ? 29 : kDays[static_cast<std::size_t>(month - 1)];
+  using namespace std::chrono;
+  return static_cast<int>(unsigned{(std::chrono::year(static_cast<int>(year % 400)) / month / last).day()});
 }
 
 /// The rule of validity of every date that is read: year >= 0, a day of its month, hour 0 to 24 and 24 only with
@@ -28,14 +33,13 @@ constexpr bool isValidDate(const DateRecord& date) {
          date[kDay] <= daysInMonth(date[kYear], date[kMonth]);
 }
 
-/// Days of the proleptic Gregorian calendar since 0000-03-01, so that leap days end a four-year cycle. The month must
-/// be 1 to 12; any day number is taken arithmetically.
+/// Days of the proleptic Gregorian calendar since 0000-03-01. The month must be 1 to 12; any day number is taken
+/// arithmetically.
 constexpr std::int64_t dayNumber(std::int64_t year, int month, int day) {
-  const std::int64_t y = month <= 2 ? year - 1 : year;
-  const int monthFromMarch = (month + 9) % 12;
-  const std::int64_t era = (y >= 0 ? y : y - 399) / 400;
-  const std::int64_t yearOfEra = y - era * 400;
-  return era * 146097 + yearOfEra * 365 + yearOfEra / 4 - yearOfEra / 100 + (153 * monthFromMarch + 2) / 5 + day - 1;
+  using namespace std::chrono;
+  const auto cycles = floor<CalendarCycles>(years(year));
+  const std::chrono::year yearOfCycle(static_cast<int>(year - 400 * cycles.count()));
+  return (days(cycles) + (sys_days(yearOfCycle / month / 1) - kFirstDay)).count() + day - 1;
 }
 
 /// Seconds since 0000-03-01 00:00 of a valid date; 24:00 is the next day's 00:00 and minute 60 the next hour's start.
@@ -50,5 +54,13 @@ DateRecord dateOfSecond(std::int64_t second);
 
 /// "2001-01-31 12:30", with ":SS" where the seconds are not 0.
 std::string formatDate(const DateRecord& date);
+
+/// "2001-01-31T12:30:00" of a secondNumber(): the form that programs read.
+std::string isoTime(std::int64_t second);
+
+/// Takes a date without its time off the front of `text`: a year of 4 digits, or of `leastYearDigits` to 4, a month and
+/// a day of 1 or 2 each, "-" between them. The fields are taken apart and not judged: month 13 is a date here. Nothing
+/// where `text` begins otherwise; what was taken of it by then is lost.
+std::optional<DateRecord> takeDay(std::string_view& text, std::size_t leastYearDigits = 4);
 
 }  // namespace mirevo

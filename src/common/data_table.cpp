@@ -1,7 +1,6 @@
 #include "common/data_table.h"
 
 #include <algorithm>
-#include <cmath>
 #include <limits>
 
 #include "common/text.h"
@@ -53,12 +52,8 @@ std::string cellText(const DataTable::Cell& cell) {
 
 std::vector<std::string> cellsOf(std::string_view line) {
   std::vector<std::string> cells;
-  for (;;) {
-    const std::size_t tab = line.find('\t');
-    cells.push_back(unescaped(line.substr(0, tab)));
-    if (tab == std::string_view::npos) return cells;
-    line.remove_prefix(tab + 1);
-  }
+  for (const std::string_view cell : splitAt(line, '\t')) cells.push_back(unescaped(cell));
+  return cells;
 }
 
 }  // namespace

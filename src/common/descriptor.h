@@ -6,7 +6,7 @@
 
 namespace mirevo {
 
-/// Closes a file descriptor at the end of its scope, keeping errno. A negative one is none.
+/// Closes a file descriptor at the end of its scope and leaves errno as it is. A negative number stands for no file.
 class Descriptor final {
  public:
   explicit Descriptor(int fd) : fd_(fd) {}
@@ -18,8 +18,8 @@ class Descriptor final {
   Descriptor(const Descriptor&) = delete;
   Descriptor& operator=(const Descriptor&) = delete;
   int get() const { return fd_; }
-  /// Closes it now. False, with the reason in errno, when what was written did not all arrive: a network file system
-  /// may tell only here that its disk is full.
+  /// Closes it now. False, with the reason in errno, when something that was written has not reached the file: a
+  /// network file system may report only here that its disk is full.
   bool close() {
     const int fd = std::exchange(fd_, -1);
     return fd < 0 || ::close(fd) == 0 || errno == EINTR;  // an interrupted one is closed all the same

@@ -5,16 +5,16 @@
 
 namespace mirevo {
 
-/// How far a text got that was written to a descriptor.
+/// How much of a text was written to a descriptor.
 struct OutputResult {
-  std::size_t taken = 0;  ///< bytes
-  int error = 0;          ///< 0: all of it; EAGAIN: whoever reads took nothing in time; else the system's reason
+  std::size_t taken = 0;  ///< bytes written
+  int error = 0;          ///< 0: all was written; EAGAIN: the reader took nothing in time; else the system's error
 };
 
 inline constexpr int kAsLongAsItTakes = -1;
 
-/// Writes `text` with write(2). It waits at most `patienceMilliseconds` each time a terminal or pipe takes nothing: a
-/// terminal that is stopped, a pager that nobody scrolls. Files on disk are never waited for.
+/// Writes `text` with write(2). Each time a terminal or pipe takes nothing (a stopped terminal, a pager that nobody
+/// scrolls), it waits for at most `patienceMilliseconds`. It never waits for files on disk.
 OutputResult writeWhole(int descriptor, std::string_view text, int patienceMilliseconds = kAsLongAsItTakes);
 
 }  // namespace mirevo

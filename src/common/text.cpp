@@ -7,6 +7,8 @@
 
 #include <fmt/format.h>
 
+#include "common/utf8.h"
+
 namespace mirevo {
 namespace {
 
@@ -131,6 +133,26 @@ std::optional<std::string> nearestName(std::string_view name, std::span<const st
     }
   }
   return nearest;
+}
+
+std::string quotedForMessage(std::string_view text) {
+  constexpr std::size_t kLongest = 60;
+  std::size_t end = std::min(text.size(), kLongest);
+  while (end > 0 && end < text.size() && isInsideCharacter(text[end])) --end;
+  std::string quoted = "\"";
+  for (const char c : text.substr(0, end)) quoted += isControlCharacter(c) || c == '\x7F' ? '?' : c;
+  return quoted + (end < text.size() ? "...\"" : "\"");
+}
+
+std::vector<std::string_view> splitAt(std::string_view text, char separator, std::size_t mostParts) {
+  std::vector<std::string_view> parts;
+  std::size_t end = 0;
+  while (parts.size() + 1 < mostParts && (end = text.find(separator)) != std::string_view::npos) {
+    parts.push_back(text.substr(0, end));
+    text.remove_prefix(end + 1);
+  }
+  parts.push_back(text);
+  return parts;
 }
 
 std::vector<std::string_view> splitLines(std::string_view text) {

@@ -34,9 +34,22 @@ std::string formatReal(double value);
 /// The fixed texts with a number in them: `text` with its first "%" replaced by `number`.
 std::string withNumber(std::string_view text, std::int64_t number);
 
+/// Whether this is a C0 control character other than a tab.
+constexpr bool isControlCharacter(char c) {
+  return static_cast<unsigned char>(c) < 0x20 && c != '\t';
+}
+
+/// `text` between double quotes for a message: cut to a readable length, control characters replaced.
+std::string quotedForMessage(std::string_view text);
+
 /// The candidate nearest to `name` (Levenshtein distance, case ignored), for "did you mean"; nothing when none is
 /// closer than a third of the name's length, at least one edit.
 std::optional<std::string> nearestName(std::string_view name, std::span<const std::string> candidates);
+
+/// The parts of `text` between separators, one more than there are of these, and at most `mostParts`: the last of so
+/// many is all that is left.
+std::vector<std::string_view> splitAt(std::string_view text, char separator,
+                                      std::size_t mostParts = std::string_view::npos);
 
 /// The lines of `text`, without their line ends (LF or CRLF); a last line without an end counts.
 std::vector<std::string_view> splitLines(std::string_view text);

@@ -2,7 +2,7 @@
 
 #include <utility>
 
-#include "common/text.h"
+#include "common/progress_messages.h"
 
 namespace mirevo {
 
@@ -38,28 +38,27 @@ std::optional<std::size_t> EvaluationLedger::takeNext() {
 }
 
 void EvaluationLedger::markInitiated(std::size_t place) {
-  observer_.message(withNumber("Evaluation of parameter set No. % initiated", numberOf(place)));
+  observer_.message(progress::initiatedMessage(numberOf(place)));
 }
 
 void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::string_view leftBehind) {
   result.number = numberOf(place);
   if (!leftBehind.empty()) {
-    observer_.warning(withNumber("Evaluation of parameter set No. %: ", result.number).append(leftBehind));
+    observer_.warning(progress::nameOfEvaluation(result.number).append(": ").append(leftBehind));
   }
   warnOfUnusedObservations(result);
   for (const std::string& text : result.warnings) {
-    observer_.warning(withNumber("Evaluation of parameter set No. %: ", result.number) + text);
+    observer_.warning(progress::nameOfEvaluation(result.number) + ": " + text);
   }
-  std::string_view outcome = "Evaluation of parameter set No. % completed: OK";
+  std::string_view outcome = progress::kOk;
   if (!result.ok()) {
-    outcome = result.failure->kind == EvaluationFailure::Kind::constraintsViolated
-                  ? "Evaluation of parameter set No. % completed: FAILED - parameter constraints violated"
-                  : "Evaluation of parameter set No. % completed: FAILED - model run error";
+    outcome = result.failure->kind == EvaluationFailure::Kind::constraintsViolated ? progress::kConstraintsViolated
+                                                                                   : progress::kModelRunError;
   }
   std::optional<EvaluationResult> known;  // a repeated run has its row already, which stands
   if (earlier_ != nullptr) known = earlier_->take(result.number, sets_[place]);
   if (!known) observer_.recordEvaluation(sets_[place], result);
-  observer_.message(withNumber(outcome, result.number));
+  observer_.message(progress::completedMessage(result.number, outcome));
   if (known) {
     known->shownSeries = std::move(result.shownSeries);
     return replay(place, std::move(*known));
@@ -74,7 +73,7 @@ void EvaluationLedger::warnOfUnusedObservations(const EvaluationResult& result) 
     const auto [fewest, isFirst] = fewestUsed_.try_emplace(unused.measure, unused.usedCount);
     if (!isFirst && fewest->second <= unused.usedCount) continue;
     fewest->second = unused.usedCount;
-    observer_.warning(withNumber("Evaluation of parameter set No. %: ", result.number) + unused.text);
+    observer_.warning(progress::nameOfEvaluation(result.number) + ": " + unused.text);
   }
 }
 

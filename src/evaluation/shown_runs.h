@@ -5,7 +5,6 @@
 #include <map>
 #include <span>
 #include <utility>
-#include <vector>
 
 #include "common/parameter_set.h"
 

@@ -10,7 +10,9 @@
 
 #include "common/fatal_error.h"
 #include "common/files.h"
+#include "common/take_text.h"
 #include "common/text.h"
+#include "common/utf8.h"
 #include "parameters/placeholder_width.h"
 #include "parameters/template_lines.h"
 #include "parameters/value_format.h"
@@ -18,15 +20,13 @@
 namespace mirevo {
 namespace {
 
-constexpr std::string_view kByteOrderMark = "\xEF\xBB\xBF";
-
 bool isDigit(char c) {
   return c >= '0' && c <= '9';
 }
 
 /// The delimiter that the first line of a template holds.
 char readDelimiter(std::string_view templateName, std::string_view line) {
-  if (line.substr(0, kByteOrderMark.size()) == kByteOrderMark) line.remove_prefix(kByteOrderMark.size());
+  takeText(line, kByteOrderMark);
   line = trim(line);
   const auto refuse = [templateName](std::string_view reason) {
     fatalError(fmt::format("Error: Delimiter not defined in template file {}", templateName), reason);
@@ -36,8 +36,7 @@ char readDelimiter(std::string_view templateName, std::string_view line) {
   if (isDigit(delimiter) || std::string_view("+-.E").find(delimiter) != std::string_view::npos) {
     refuse(fmt::format("\"{}\" is a character of numbers and cannot mark placeholders; take ! or $ or #", delimiter));
   }
-  if (line.size() > 1 && static_cast<unsigned char>(delimiter) >= 0xC2 &&
-      (static_cast<unsigned char>(line[1]) & 0xC0) == 0x80) {
+  if (line.size() > 1 && static_cast<unsigned char>(delimiter) >= 0xC2 && isInsideCharacter(line[1])) {
     refuse("the delimiter must be a single-byte character, such as ! or $ or #");
   }
   return delimiter;

@@ -1,9 +1,6 @@
 #include "report/report_json.h"
 
 #include <algorithm>
-#include <cmath>
-
-#include <fmt/format.h>
 
 #include "common/calendar.h"
 #include "measures/fit_figures.h"
@@ -38,13 +35,6 @@ std::string_view stateName(RunStateShown state) {
 std::int64_t epochMilliseconds(std::int64_t second) {
   constexpr std::int64_t kEpoch = dayNumber(1970, 1, 1) * 86400;
   return (second - kEpoch) * kMilliseconds;
-}
-
-std::string isoTime(std::int64_t second) {
-  using namespace date_field;
-  const DateRecord date = dateOfSecond(second);
-  return fmt::format("{:04}-{:02}-{:02}T{:02}:{:02}:{:02}", date[kYear], date[kMonth], date[kDay], date[kHour],
-                     date[kMinute], date[kSecond]);
 }
 
 /// The times as start and step where they are equidistant, else one by one.

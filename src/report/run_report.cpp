@@ -1,9 +1,7 @@
 #include "report/run_report.h"
 
 #include <algorithm>
-#include <array>
 #include <cmath>
-#include <ctime>
 #include <exception>
 #include <filesystem>
 #include <sys/stat.h>
@@ -37,11 +35,7 @@ constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
 /// Local time at which the file was last written; empty where there is none.
 std::string timeOfFile(const std::string& path) {
   struct stat status {};
-  if (::stat(path.c_str(), &status) != 0) return {};
-  std::tm local{};
-  ::localtime_r(&status.st_mtime, &local);
-  std::array<char, 40> text{};
-  return {text.data(), std::strftime(text.data(), text.size(), "%Y-%m-%d %H:%M:%S", &local)};
+  return ::stat(path.c_str(), &status) == 0 ? dateAndTimeOf(status.st_mtime) : std::string{};
 }
 
 /// What stands behind `label` in the first line that begins with it.

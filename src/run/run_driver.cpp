@@ -10,6 +10,7 @@
 #include "common/clock.h"
 #include "common/fatal_error.h"
 #include "common/files.h"
+#include "common/progress_messages.h"
 #include "common/text.h"
 #include "common/version.h"
 #include "evaluation/local_evaluator.h"
@@ -31,7 +32,7 @@
 namespace mirevo {
 namespace {
 
-constexpr std::string_view kNormalTermination = "Normal termination";
+using progress::kNormalTermination;
 /// For all workers to have ended their models, which may take a grace time and a kill.
 constexpr double kWorkerStopSeconds = 20.0;
 /// At the end of a task, when a worker that was not needed may still be copying a large base folder.
@@ -64,7 +65,7 @@ int RunDriver::run(const std::string& setupFileName) {
     openResults();
     // Not before earlier results have been renamed: where they lie in the base folder, workers look at them.
     if (state_.mpiInUse) beginWorkers(state_.mpi, {config_.setupFile, setupText});
-    state_.progress.writeMessage("Title: " + config_.title);
+    state_.progress.writeMessage(std::string(progress::kTitle) + config_.title);
     state_.progress.writeStatus(config_.taskDescription());
     state_.progress.progressEvaluationLabel(config_.plannedModelRuns());
     finish(runTask());
@@ -122,7 +123,7 @@ void RunDriver::openRun(const std::string& setupFileName) {
       showMessage(problem, {}, MessageType::warning);
     }
   }
-  state_.progress.progressStart(fmt::format("{} on {}, process {}", dateAndTimeWithZone(), hostName(), ::getpid()));
+  state_.progress.progressStart(dateAndTimeWithZone(), hostName(), ::getpid());
 }
 
 void RunDriver::buildModel() {

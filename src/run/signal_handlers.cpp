@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <array>
-#include <cerrno>
 #include <cstdlib>
 #include <poll.h>
 #include <signal.h>
@@ -10,6 +9,7 @@
 #include <ucontext.h>
 #include <unistd.h>
 
+#include "common/progress_messages.h"
 #include "platform/signals/signal_state.h"
 #include "platform/terminal/front_end.h"
 
@@ -40,8 +40,8 @@ void showFromSignal(int descriptor, std::string_view text, std::string_view titl
   if (void (*halt)() = signalState.haltProcesses; halt != nullptr) halt();
   if (const int results = signalState.resultFileDescriptor; results >= 0) writeLineFromSignal(results, message, "# ");
   if (const int records = signalState.messageFileDescriptor; records >= 0) {
-    writeLineFromSignal(records, message, "STATUSEnded: ");
-    writeLineFromSignal(records, "PROGRE100.0");
+    writeLineFromSignal(records, message, progress::kEndedRecord);
+    writeLineFromSignal(records, progress::kCompleteRecord);
   }
   if (signalState.showsMessageBox) {
     showFromSignal(STDERR_FILENO, message, {boxTitle.data(), boxTitleLength});

@@ -6,32 +6,10 @@
 
 #include <fmt/format.h>
 
+#include "common/utf8.h"
+
 namespace mirevo {
 namespace {
-
-struct Character {
-  char32_t code = 0;
-  std::size_t bytes = 1;
-  bool isValid = false;
-};
-
-/// The character that `text`, which is not empty, begins with. Overlong forms and surrogates are invalid.
-Character firstCharacter(std::string_view text) {
-  const auto byte = [text](std::size_t i) { return static_cast<unsigned char>(text[i]); };
-  const unsigned char lead = byte(0);
-  if (lead < 0x80) return {lead, 1, true};
-  const std::size_t length = lead >= 0xF0 ? 4 : lead >= 0xE0 ? 3 : 2;
-  if (lead < 0xC2 || lead > 0xF4 || text.size() < length) return {};
-  char32_t code = lead & (0xFFU >> (length + 1));
-  for (std::size_t i = 1; i < length; ++i) {
-    if ((byte(i) & 0xC0U) != 0x80U) return {};
-    code = (code << 6) | (byte(i) & 0x3FU);
-  }
-  constexpr std::array<char32_t, 5> kSmallest{0, 0, 0x80, 0x800, 0x10000};
-  const bool isSurrogate = code >= 0xD800 && code <= 0xDFFF;
-  if (code < kSmallest[length] || code > 0x10FFFF || isSurrogate) return {};
-  return {code, length, true};
-}
 
 struct Range {
   char32_t first;
@@ -70,7 +48,7 @@ int widthOf(char32_t code) {
 std::string_view beginning(std::string_view text, int width) {
   std::size_t bytes = 0;
   while (bytes < text.size()) {
-    const Character character = firstCharacter(text.substr(bytes));
+    const Utf8Character character = firstCharacter(text.substr(bytes));
     width -= widthOf(character.code);
     if (width < 0) break;
     bytes += character.bytes;
@@ -83,7 +61,7 @@ std::string_view beginning(std::string_view text, int width) {
 std::string printable(std::string_view raw, CharacterSet characters) {
   std::string text;
   while (!raw.empty()) {
-    const Character character = firstCharacter(raw);
+    const Utf8Character character = firstCharacter(raw);
     if (character.code == '\t') {
       text += ' ';
     } else if (!character.isValid || isIn(kUnprintable, character.code) ||
@@ -100,7 +78,7 @@ std::string printable(std::string_view raw, CharacterSet characters) {
 int displayWidth(std::string_view text) {
   int width = 0;
   while (!text.empty()) {
-    const Character character = firstCharacter(text);
+    const Utf8Character character = firstCharacter(text);
     width += widthOf(character.code);
     text.remove_prefix(character.bytes);
   }

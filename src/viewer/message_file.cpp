@@ -1,30 +1,16 @@
 #include "viewer/message_file.h"
 
-#include <algorithm>
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
+
+#include "common/descriptor.h"
 
 namespace mirevo {
 namespace {
 
 constexpr std::size_t kPiece = 262'144;
 constexpr std::size_t kHead = 256;
-
-class OpenFile {
- public:
-  explicit OpenFile(const std::string& path)
-      : descriptor_(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY)) {}
-  ~OpenFile() {
-    if (descriptor_ >= 0) ::close(descriptor_);
-  }
-  OpenFile(const OpenFile&) = delete;
-  OpenFile& operator=(const OpenFile&) = delete;
-  int descriptor() const { return descriptor_; }
-
- private:
-  int descriptor_;
-};
 
 }  // namespace
 
@@ -36,17 +22,17 @@ bool MessageFile::isBegunAnew(int descriptor, off_t size) const {
 }
 
 bool MessageFile::readPiece(ProgressRecords& records, std::vector<std::string>* messages) {
-  const OpenFile file(path_);
+  const Descriptor file(::open(path_.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
   struct stat about {};
-  if (file.descriptor() < 0 || ::fstat(file.descriptor(), &about) != 0 || !S_ISREG(about.st_mode)) return false;
-  if (isBegunAnew(file.descriptor(), about.st_size)) {
+  if (file.get() < 0 || ::fstat(file.get(), &about) != 0 || !S_ISREG(about.st_mode)) return false;
+  if (isBegunAnew(file.get(), about.st_size)) {
     records.clear();
     position_ = 0;
     head_.clear();
   }
   if (about.st_size <= position_) return false;
   buffer_.resize(kPiece);
-  const ssize_t count = ::pread(file.descriptor(), buffer_.data(), buffer_.size(), position_);
+  const ssize_t count = ::pread(file.get(), buffer_.data(), buffer_.size(), position_);
   if (count <= 0) return false;
   const std::string_view bytes(buffer_.data(), static_cast<std::size_t>(count));
   if (position_ < static_cast<off_t>(kHead)) {

@@ -30,7 +30,6 @@ class ProgressRecords final {
   void takeStatus(std::string_view text);
   void takeMessage(std::string_view text);
   bool takeEvaluationMessage(std::string_view text);
-  bool takeBest(std::string_view text);
   void addCoursePoint();
 
   ProgressState state_;

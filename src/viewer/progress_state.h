@@ -6,17 +6,17 @@
 #include <string>
 #include <vector>
 
+#include "common/progress_messages.h"
+
 namespace mirevo {
 
 /// What a run has told about itself so far, as its message file holds it. Times are seconds since 1970-01-01 UTC.
 struct ProgressState {
   bool hasRecords = false;
   std::string title;
-  std::string task;    ///< what it is doing
-  std::string ending;  ///< how it ended; empty until the run itself has said so
-  std::string host;
-  std::int64_t process = 0;         ///< 0 while unknown
-  std::optional<double> startedAt;  ///< by the clock of the run's machine
+  std::string task;            ///< what it is doing
+  std::string ending;          ///< how it ended; empty until the run itself has said so
+  progress::RunOrigin origin;  ///< times by the clock of the run's machine
 
   std::string countLabel;               ///< "Model evaluation"; empty before the task has begun
   std::optional<std::int64_t> planned;  ///< evaluations
@@ -28,12 +28,7 @@ struct ProgressState {
   std::optional<double> secondsLeft;  ///< as told at `lastNewsAt`
   double lastNewsAt = 0.0;            ///< when the latest records were written
 
-  struct Best {
-    double aggregate = 0.0;
-    std::int64_t evaluation = 0;
-    std::optional<double> foundAt;
-  };
-  std::optional<Best> best;
+  std::optional<progress::BestEvaluation> best;
 
   /// The best aggregate after `evaluations` of them, from there to the next point.
   struct CoursePoint {

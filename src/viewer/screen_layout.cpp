@@ -1,7 +1,6 @@
 #include "viewer/screen_layout.h"
 
 #include <algorithm>
-#include <cmath>
 #include <initializer_list>
 
 #include <fmt/format.h>
@@ -19,7 +18,6 @@ constexpr int kNarrowColumns = 50;  ///< below it labels and values are shortene
 constexpr int kLabelColumns = 13;
 constexpr int kNarrowLabelColumns = 10;
 constexpr double kQuietSeconds = 60.0;
-constexpr std::string_view kNormalEnding = "Normal termination";
 
 struct Fact {
   std::string label;
@@ -55,9 +53,9 @@ std::string timeLeftText(const ProgressState& state, const ViewerSituation& situ
 }
 
 std::string runningForText(const ProgressState& state, const ViewerSituation& situation) {
-  if (!state.startedAt) return "-";
+  if (!state.origin.startedAt) return "-";
   return durationText((situation.presence == RunPresence::running ? situation.now : state.lastNewsAt) -
-                      *state.startedAt);
+                      *state.origin.startedAt);
 }
 
 /// In the order of their worth.
@@ -150,7 +148,7 @@ void addHeading(Screen& screen, const ProgressState& state, const ViewerSituatio
   screen.add(line + right, LineStyle::heading);
   const std::string outcome = outcomeText(state, situation);
   if (!outcome.empty()) {
-    screen.add(outcome, state.ending == kNormalEnding ? LineStyle::good : LineStyle::alarm);
+    screen.add(outcome, state.ending == progress::kNormalTermination ? LineStyle::good : LineStyle::alarm);
   }
   const bool hasRoom = screen.freeRows() > 7 || (outcome.empty() && screen.freeRows() > 5);
   if (!state.task.empty() && hasRoom) screen.add(state.task);
@@ -158,7 +156,7 @@ void addHeading(Screen& screen, const ProgressState& state, const ViewerSituatio
 
 /// A run ends with 100 per cent whatever the reason; one that was cut short has come as far as its evaluations.
 std::optional<double> percentReached(const ProgressState& state) {
-  const bool wasCutShort = !state.ending.empty() && state.ending != kNormalEnding;
+  const bool wasCutShort = !state.ending.empty() && state.ending != progress::kNormalTermination;
   if (!wasCutShort) return state.percent;
   if (state.planned.value_or(0) < 1) return std::nullopt;
   return std::min(100.0, 100.0 * static_cast<double>(state.done) / static_cast<double>(*state.planned));
@@ -207,7 +205,8 @@ void addMessages(Screen& screen, const ProgressState& state) {
   const int room = screen.freeRows() - (hasRoutine ? 1 : 0);
   const std::size_t shown = std::min(state.notices.size(), static_cast<std::size_t>(std::max(0, room)));
   for (std::size_t i = state.notices.size() - shown; i < state.notices.size(); ++i) {
-    const bool isAlarm = state.notices[i].find("FAILED") != std::string::npos || state.notices[i].starts_with("Error");
+    const bool isAlarm =
+        state.notices[i].find(progress::kFailed) != std::string::npos || state.notices[i].starts_with("Error");
     screen.add(state.notices[i], isAlarm ? LineStyle::alarm : LineStyle::plain);
   }
   if (hasRoutine) screen.add(state.latestMessage, LineStyle::faint);
@@ -219,7 +218,7 @@ std::string outcomeText(const ProgressState& state, const ViewerSituation& situa
   if (situation.presence == RunPresence::ended) return state.ending;
   if (situation.presence != RunPresence::vanished) return {};
   if (situation.exitCode) return fmt::format("The run ended with exit code {}", *situation.exitCode);
-  return fmt::format("The run is gone without saying how it ended; process {} was its own", state.process);
+  return fmt::format("The run is gone without saying how it ended; process {} was its own", state.origin.process);
 }
 
 std::vector<ScreenLine> layoutScreen(const ProgressState& state, const ViewerSituation& situation, ScreenSize size,

@@ -56,7 +56,7 @@ Viewer::Viewer(std::string setupFile, std::unique_ptr<RunProcess> started)
 const ProgressState& Viewer::state() const {
   // Until the started run has begun its message file, what stands there is of an earlier run.
   static const ProgressState kNothingYet;
-  if (started_ && records_.state().process != started_->process()) return kNothingYet;
+  if (started_ && records_.state().origin.process != started_->process()) return kNothingYet;
   return records_.state();
 }
 
@@ -92,8 +92,8 @@ void Viewer::readNews() {
   // Asked before the records are read: a run that has just ended has written its last ones.
   const ProgressState& before = records_.state();
   const bool isGone = started_ ? started_->exitCode().has_value()
-                               : before.process > 0 && before.host == host_ &&
-                                     ::kill(static_cast<pid_t>(before.process), 0) != 0 && errno == ESRCH;
+                               : before.origin.process > 0 && before.origin.host == host_ &&
+                                     ::kill(static_cast<pid_t>(before.origin.process), 0) != 0 && errno == ESRCH;
   const bool takesMessages = !display_->isScreen();
   hasMore_ = true;
   for (int piece = 0; hasMore_ && piece < kPiecesAtATime; ++piece) {
@@ -103,7 +103,7 @@ void Viewer::readNews() {
     }
   }
   if (!hasMore_) hasCaughtUp_ = true;
-  if (started_ && records_.state().process != started_->process()) newMessages_.clear();
+  if (started_ && records_.state().origin.process != started_->process()) newMessages_.clear();
   readRunOutput();
   situation_.now = secondsSince1970();
   judgePresence(isGone && !hasMore_);

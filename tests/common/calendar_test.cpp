@@ -23,5 +23,23 @@ TEST(Calendar, EveryDayOfFourCenturiesFollowsTheOneBefore) {
   EXPECT_EQ(formatDate(dateOfSecond(secondNumber({2000, 2, 28, 23, 60, 7}))), "2000-02-29 00:00:07");
 }
 
+TEST(Calendar, CountsFromMarchOfTheYearZeroInEveryYear) {
+  const struct {
+    DateRecord date;
+    std::int64_t day;
+  } cases[] = {{{0, 3, 1}, 0},
+               {{0, 2, 29}, -1},
+               {{-1, 3, 1}, -366},
+               {{1970, 1, 1}, 719468},
+               {{32767, 12, 31}, 11967900 + 306 - 1},
+               {{32768, 2, 29}, 11967900 + 306 + 59},
+               {{2147483647, 12, 31}, 784352296244}};
+  for (const auto& c : cases) {
+    using namespace date_field;
+    EXPECT_EQ(dayNumber(c.date[kYear], c.date[kMonth], c.date[kDay]), c.day) << c.date[kYear];
+    EXPECT_EQ(dateOfSecond(c.day * 86400), c.date) << c.day;
+  }
+}
+
 }  // namespace
 }  // namespace mirevo

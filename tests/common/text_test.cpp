@@ -8,6 +8,8 @@
 
 #include <gtest/gtest.h>
 
+#include "common/take_text.h"
+
 namespace mirevo {
 namespace {
 
@@ -64,6 +66,29 @@ TEST(Text, SplitsLinesAtEitherLineEnd) {
   EXPECT_EQ(splitLines("a\r\nb\n\nc"), (Lines{"a", "b", "", "c"}));
   EXPECT_EQ(splitLines("a\n"), (Lines{"a"}));
   EXPECT_EQ(splitLines(""), Lines{});
+}
+
+TEST(Text, SplitsAtASeparatorIntoAtMostSoManyParts) {
+  using Parts = std::vector<std::string_view>;
+  EXPECT_EQ(splitAt("a\t\tb\t", '\t'), (Parts{"a", "", "b", ""}));
+  EXPECT_EQ(splitAt("a\tb\tc", '\t', 2), (Parts{"a", "b\tc"}));
+  EXPECT_EQ(splitAt("", '\t'), Parts{""});
+}
+
+TEST(Text, TakesNumbersOfSoManyDigitsOrNothing) {
+  const struct {
+    const char* text;
+    std::size_t least, most;
+    std::optional<std::int64_t> number;
+    const char* rest;
+  } cases[] = {{"0087 OK", 1, 9, 87, " OK"},     {"2001-01", 4, 4, 2001, "-01"},
+               {"20010", 2, 4, 2001, "0"},       {"201-01", 4, 4, std::nullopt, "201-01"},
+               {"-5", 1, 9, std::nullopt, "-5"}, {"99999999999999999999", 1, 99, std::nullopt, "99999999999999999999"}};
+  for (const auto& c : cases) {
+    std::string_view text = c.text;
+    EXPECT_EQ(takeNumber(text, c.least, c.most), c.number) << c.text;
+    EXPECT_EQ(text, c.rest);
+  }
 }
 
 TEST(Text, TrimsAndReplacesNumbers) {

@@ -45,11 +45,11 @@ TEST_F(MessageFileTest, AnotherRunIsNoticedWhetherItsFileIsShorterOrHasOutgrownT
   for (const int count : {1, 5, 50}) {
     folder_.write("basin._spi_", "MESSAGRun started 2026-01-01 00:00:00 +0000 on a, process 1\n" + evaluations(5));
     readAll();
-    EXPECT_EQ(state().process, 1);
+    EXPECT_EQ(state().origin.process, 1);
     EXPECT_EQ(state().done, 5);
     folder_.write("basin._spi_", "MESSAGRun started 2026-01-01 00:00:00 +0000 on a, process 2\n" + evaluations(count));
     readAll();
-    EXPECT_EQ(state().process, 2);
+    EXPECT_EQ(state().origin.process, 2);
     EXPECT_EQ(state().done, count);
   }
 }

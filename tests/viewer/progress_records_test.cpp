@@ -27,9 +27,9 @@ void expectState(const ProgressState& state) {
   EXPECT_EQ(state.title, "Small test basin");
   EXPECT_EQ(state.task, "Parameter optimisation: Dynamically Dimensioned Search");
   EXPECT_EQ(state.ending, "");
-  EXPECT_EQ(state.host, "vm, the big one");
-  EXPECT_EQ(state.process, 6670);
-  EXPECT_EQ(state.startedAt, 1795232534.0);  // 2026-11-21 03:42:14 UTC
+  EXPECT_EQ(state.origin.host, "vm, the big one");
+  EXPECT_EQ(state.origin.process, 6670);
+  EXPECT_EQ(state.origin.startedAt, 1795232534.0);  // 2026-11-21 03:42:14 UTC
   EXPECT_EQ(state.planned, 60);
   EXPECT_EQ(state.done, 3);
   EXPECT_EQ(state.failed, 1);
@@ -93,7 +93,7 @@ TEST(ProgressRecords, MessagesOfUnknownFormAreNoticesAndCountNothing) {
        {"Run started", "Run started 2026-13-01 00:00:00 +0000 on x, process 1", "Run started "}) {
     ProgressRecords records;
     records.feed("MESSAG" + text + "\n", 5.0);
-    EXPECT_FALSE(records.state().startedAt) << text;
+    EXPECT_FALSE(records.state().origin.startedAt) << text;
   }
 }
 

@@ -1,10 +1,10 @@
 #include "evaluation/ranks/mpi_evaluator.h"
 
-#include <chrono>
 #include <utility>
 
 #include <fmt/format.h>
 
+#include "common/clock.h"
 #include "common/fatal_error.h"
 
 namespace mirevo {
@@ -118,13 +118,11 @@ void beginWorkers(MessageChannel& channel, const BeginMessage& message) {
 }
 
 bool stopWorkers(MessageChannel& channel, double seconds, const std::function<void(const std::string&)>& warn) {
-  using Clock = std::chrono::steady_clock;
   sendToWorkers(channel, RankMessage::stop, {});
-  const Clock::time_point start = Clock::now();
+  const double deadline = runTimeClock() + seconds;
   int farewells = 0;
   while (farewells < channel.processCount() - 1) {
-    const double left = seconds - std::chrono::duration<double>(Clock::now() - start).count();
-    const auto message = channel.receive(left);
+    const auto message = channel.receive(deadline - runTimeClock());
     if (!message) return false;
     if (message->tag == static_cast<int>(RankMessage::farewell)) ++farewells;
     if (message->tag == static_cast<int>(RankMessage::failure)) {

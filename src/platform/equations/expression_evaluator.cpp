@@ -8,6 +8,7 @@
 
 #include "common/fatal_error.h"
 #include "common/text.h"
+#include "common/utf8.h"
 #include "platform/equations/equation_functions.h"
 #include "platform/equations/equation_text.h"
 
@@ -20,8 +21,7 @@ constexpr std::size_t kMaximumShownEquation = 160;
 
 /// Characters of UTF-8 text.
 std::size_t characterCount(std::string_view text) {
-  return static_cast<std::size_t>(
-      std::count_if(text.begin(), text.end(), [](char c) { return (static_cast<unsigned char>(c) & 0xC0) != 0x80; }));
+  return text.size() - static_cast<std::size_t>(std::count_if(text.begin(), text.end(), isInsideCharacter));
 }
 
 std::string describe(std::string_view equation, const EquationError& error) {

@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <array>
-#include <chrono>
 #include <cstdlib>
 #include <ctime>
 #include <list>
@@ -15,13 +14,12 @@
 #include <fmt/format.h>
 #include <mpi.h>
 
+#include "common/clock.h"
 #include "common/fatal_error.h"
 #include "common/text.h"
 
 namespace mirevo {
 namespace {
-
-using Clock = std::chrono::steady_clock;
 
 /// By which launchers tell a process its number and the number of processes: OpenMPI's mpirun; the process management
 /// interface of other launchers and of Slurm in its old form and in its new one, which has no variable for the size.
@@ -49,8 +47,8 @@ void nap(double seconds) {
   ::nanosleep(&pause, nullptr);
 }
 
-double secondsSince(Clock::time_point start) {
-  return std::chrono::duration<double>(Clock::now() - start).count();
+double secondsSince(double start) {
+  return runTimeClock() - start;
 }
 
 std::string errorText(int code) {
@@ -96,7 +94,7 @@ struct MpiSession::Traffic {
     MPI_Request request = MPI_REQUEST_NULL;
   };
   std::list<Send> running;
-  Clock::time_point lastMessage = Clock::now();  ///< sent or received
+  double lastMessage = runTimeClock();  ///< sent or received
 
   /// Forgets what has arrived.
   void complete() {
@@ -159,12 +157,12 @@ void MpiSession::send(int rank, int tag, std::string content) {
   check(MPI_Isend(send.content.data(), static_cast<int>(send.content.size()), MPI_BYTE, rank, tag, MPI_COMM_WORLD,
                   &send.request),
         "MPI_Isend");
-  traffic_->lastMessage = Clock::now();
+  traffic_->lastMessage = runTimeClock();
 }
 // NOLINTEND(clang-analyzer-optin.mpi.MPI-Checker)
 
 std::optional<Message> MpiSession::receive(double seconds) {
-  const Clock::time_point start = Clock::now();
+  const double start = runTimeClock();
   while (true) {
     traffic_->complete();
     int arrived = 0;
@@ -178,7 +176,7 @@ std::optional<Message> MpiSession::receive(double seconds) {
       check(MPI_Recv(message.content.data(), size, MPI_BYTE, message.rank, message.tag, MPI_COMM_WORLD,
                      MPI_STATUS_IGNORE),
             "MPI_Recv");
-      traffic_->lastMessage = Clock::now();
+      traffic_->lastMessage = runTimeClock();
       return message;
     }
     const double waited = secondsSince(start);
@@ -189,7 +187,7 @@ std::optional<Message> MpiSession::receive(double seconds) {
 
 void MpiSession::finalise(double seconds) {
   if (!inUse()) return;
-  const Clock::time_point start = Clock::now();
+  const double start = runTimeClock();
   for (traffic_->complete(); !traffic_->running.empty(); traffic_->complete()) {
     const double waited = secondsSince(start);
     if (waited >= seconds) {

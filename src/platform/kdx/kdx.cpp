@@ -5,6 +5,7 @@
 
 #include <fmt/format.h>
 
+#include "common/text.h"
 #include "platform/kdx/kdx_value.h"
 
 namespace mirevo {

@@ -110,10 +110,4 @@ std::variant<KdxDocument, KdxSyntaxError> parseKdx(std::string sourceName, std::
 /// form. The fields are taken apart and not judged: month 13 is a date here.
 std::optional<DateRecord> parseKdxDate(std::string_view text);
 
-/// "2001-01-31 12:30", with the seconds where they are not 0.
-std::string formatKdxDate(const DateRecord& date);
-
-/// `text` between double quotes for a message: cut to a readable length, control characters replaced.
-std::string quotedForMessage(std::string_view text);
-
 }  // namespace mirevo

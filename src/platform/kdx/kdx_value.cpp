@@ -4,35 +4,16 @@
 
 #include <fmt/format.h>
 
+#include "common/calendar.h"
+#include "common/take_text.h"
 #include "common/text.h"
+#include "common/utf8.h"
 
 namespace mirevo {
 namespace {
 
 bool isBlank(char c) {
   return c == ' ' || c == '\t' || c == '\r';
-}
-bool isDigit(char c) {
-  return c >= '0' && c <= '9';
-}
-bool isControl(char c) {
-  return static_cast<unsigned char>(c) < 0x20 && c != '\t';
-}
-
-/// Takes `least` to `most` digits off the front of `text`.
-std::optional<std::int32_t> takeDigits(std::string_view& text, std::size_t least, std::size_t most) {
-  std::int32_t value = 0;
-  std::size_t count = 0;
-  while (count < most && count < text.size() && isDigit(text[count])) value = value * 10 + (text[count++] - '0');
-  if (count < least) return std::nullopt;
-  text.remove_prefix(count);
-  return value;
-}
-
-bool takeCharacter(std::string_view& text, char c) {
-  if (text.empty() || text.front() != c) return false;
-  text.remove_prefix(1);
-  return true;
 }
 
 /// Reads the text between quotes, the same quote inside written twice.
@@ -46,7 +27,7 @@ std::variant<KdxValue, KdxSyntaxError> readText(KdxCursor& cursor) {
     if (i >= line.size()) {
       return KdxSyntaxError{start, fmt::format("expected a closing {} before the end of the line", quote)};
     }
-    if (isControl(line[i])) {
+    if (isControlCharacter(line[i])) {
       return KdxSyntaxError{{start.line, start.column + static_cast<int>(i)},
                             fmt::format("expected a text without control characters, found character {}",
                                         static_cast<int>(static_cast<unsigned char>(line[i])))};
@@ -71,7 +52,7 @@ std::optional<KdxValue> readNumber(std::string_view word, KdxPosition start) {
 }  // namespace
 
 KdxCursor::KdxCursor(std::string_view text) : text_(text) {
-  if (text_.starts_with("\xEF\xBB\xBF")) text_.remove_prefix(3);
+  takeText(text_, kByteOrderMark);
 }
 
 bool KdxCursor::atLineEndOrComment() const {
@@ -143,56 +124,24 @@ std::variant<KdxValue, KdxSyntaxError> readKdxValue(KdxCursor& cursor, char sepa
 
 std::optional<DateRecord> parseKdxDate(std::string_view text) {
   text = trim(text);
-  DateRecord date{};
-  // Four digits of the year keep every count of days small.
-  const auto year = takeDigits(text, 4, 4);
-  if (!year || !takeCharacter(text, '-')) return std::nullopt;
-  const auto month = takeDigits(text, 1, 2);
-  if (!month || !takeCharacter(text, '-')) return std::nullopt;
-  const auto day = takeDigits(text, 1, 2);
-  if (!day) return std::nullopt;
-  date[date_field::kYear] = *year;
-  date[date_field::kMonth] = *month;
-  date[date_field::kDay] = *day;
-  if (text.empty()) return date;
-
-  if (!takeCharacter(text, 'T')) {
+  std::optional<DateRecord> date = takeDay(text);
+  if (!date || text.empty()) return date;
+  if (!takeText(text, "T")) {
     if (!isBlank(text.front())) return std::nullopt;
     text = trim(text);
   }
-  const auto hour = takeDigits(text, 1, 2);
-  if (!hour || !takeCharacter(text, ':')) return std::nullopt;
-  const auto minute = takeDigits(text, 2, 2);
+  const auto hour = takeNumber(text, 1, 2);
+  if (!hour || !takeText(text, ":")) return std::nullopt;
+  const auto minute = takeNumber(text, 2, 2);
   if (!minute) return std::nullopt;
-  date[date_field::kHour] = *hour;
-  date[date_field::kMinute] = *minute;
+  (*date)[date_field::kHour] = static_cast<std::int32_t>(*hour);
+  (*date)[date_field::kMinute] = static_cast<std::int32_t>(*minute);
   if (text.empty()) return date;
 
-  const auto second = takeCharacter(text, ':') ? takeDigits(text, 2, 2) : std::nullopt;
+  const auto second = takeText(text, ":") ? takeNumber(text, 2, 2) : std::nullopt;
   if (!second || !text.empty()) return std::nullopt;
-  date[date_field::kSecond] = *second;
+  (*date)[date_field::kSecond] = static_cast<std::int32_t>(*second);
   return date;
-}
-
-std::string formatKdxDate(const DateRecord& date) {
-  std::string text = fmt::format("{:04}-{:02}-{:02} {:02}:{:02}", date[date_field::kYear], date[date_field::kMonth],
-                                 date[date_field::kDay], date[date_field::kHour], date[date_field::kMinute]);
-  if (date[date_field::kSecond] != 0) text += fmt::format(":{:02}", date[date_field::kSecond]);
-  return text;
-}
-
-std::string quotedForMessage(std::string_view text) {
-  constexpr std::size_t kLongest = 60;
-  const bool cut = text.size() > kLongest;
-  if (cut) {
-    std::size_t end = kLongest;
-    while (end > 0 && (static_cast<unsigned char>(text[end]) & 0xC0U) == 0x80U) --end;  // whole UTF-8 characters
-    text = text.substr(0, end);
-  }
-  std::string quoted = "\"";
-  for (const char c : text) quoted += isControl(c) || c == '\x7F' ? '?' : c;
-  quoted += cut ? "...\"" : "\"";
-  return quoted;
 }
 
 }  // namespace mirevo

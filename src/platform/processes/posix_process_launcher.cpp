@@ -12,7 +12,6 @@
 #include <filesystem>
 #include <limits>
 #include <new>
-#include <optional>
 #include <poll.h>
 #include <span>
 #include <string_view>
@@ -25,6 +24,7 @@
 #include "common/clock.h"
 #include "common/fatal_error.h"
 #include "common/files.h"
+#include "common/paths.h"
 #include "common/text.h"
 #include "platform/processes/argument_text.h"
 #include "platform/processes/process_folder.h"
@@ -56,10 +56,6 @@ int openAboveStandard(const char* path, int flags, unsigned mode) {
   ::close(fd);
   errno = error;
   return moved;
-}
-
-bool liesIn(const std::filesystem::path& path, const std::filesystem::path& folder) {
-  return std::mismatch(folder.begin(), folder.end(), path.begin(), path.end()).first == folder.end();
 }
 
 /// Why an existing file could not be executed because of its first line, if that is why.
@@ -139,7 +135,7 @@ bool PosixProcessLauncher::initialise(const LauncherSettings& settings) {
       std::string reason;
       auto words = splitArguments(item.arguments, reason);
       if (!words) fatalError(fmt::format("Arguments of {}: {}: {}", item.batchFileName, reason, item.arguments));
-      if (!liesIn(item.batchFileName, settings.baseFolder)) {
+      if (!pathInFolder(item.batchFileName, settings.baseFolder)) {
         fatalError(fmt::format("{} does not lie in the model's folder {}", item.batchFileName, settings.baseFolder));
       }
       arguments.push_back(std::move(*words));
@@ -175,11 +171,11 @@ void PosixProcessLauncher::prepareSlot(const LauncherSettings& settings, int num
   slot.folder = settings.processFolderPrefix + std::to_string(settings.firstFolderNumber + number - 1);
   std::error_code failed;
   const auto resolved = [&failed](const std::string& folder) {
-    auto path = std::filesystem::weakly_canonical(folder, failed);
+    std::string path = std::filesystem::weakly_canonical(folder, failed).string();
     if (failed) fatalError(fmt::format("Unable to look at {}: {}", folder, failed.message()));
     return path;
   };
-  if (liesIn(resolved(settings.baseFolder), resolved(slot.folder))) {
+  if (pathInFolder(resolved(settings.baseFolder), resolved(slot.folder))) {
     fatalError(fmt::format("The model's folder {} lies in the process folder {}, which is made anew for every run",
                            settings.baseFolder, slot.folder));
   }

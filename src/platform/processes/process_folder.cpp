@@ -19,6 +19,8 @@
 #include "common/descriptor.h"
 #include "common/fatal_error.h"
 #include "common/file_copy.h"
+#include "common/paths.h"
+#include "common/take_text.h"
 #include "platform/processes/run_made_entries.h"
 
 namespace mirevo {
@@ -115,10 +117,6 @@ void copyFile(const std::string& source, const std::string& target, const struct
   if (!to.close()) fail("write", target, errno);
 }
 
-bool liesIn(const std::filesystem::path& path, const std::filesystem::path& folder) {
-  return std::mismatch(folder.begin(), folder.end(), path.begin(), path.end()).first == folder.end();
-}
-
 /// Copies the link `source`, below `sourceRoot`, to `target`.
 void copyLink(const std::string& source, const std::string& target, const std::string& sourceRoot,
               const std::string& targetRoot) {
@@ -129,10 +127,10 @@ void copyLink(const std::string& source, const std::string& target, const std::s
   const std::string text(buffer.data(), static_cast<std::size_t>(length));
   const std::filesystem::path written(text);
   const auto meant = (std::filesystem::path(source).parent_path() / written).lexically_normal();
-  const bool inside = liesIn(meant, sourceRoot);
+  const auto inside = pathInFolder(meant.native(), sourceRoot);
   std::string content = text;
   if (written.is_absolute() && inside) {
-    content = (std::filesystem::path(targetRoot) / meant.lexically_relative(sourceRoot)).lexically_normal().string();
+    content = (std::filesystem::path(targetRoot) / *inside).lexically_normal().string();
   } else if (written.is_relative() && !inside) {
     content = meant.string();
   }
@@ -155,7 +153,7 @@ class ProcessFolderNames final {
   bool contains(std::string_view name) const {
     if (!name.starts_with(beginning_)) return false;
     name.remove_prefix(beginning_.size());
-    return takeNumber(name) && name.empty();
+    return !takeDigits(name).empty() && name.empty();
   }
 
  private:

@@ -8,7 +8,6 @@
 #include <memory>
 #include <new>
 #include <optional>
-#include <string_view>
 #include <sys/mman.h>
 
 #include "common/files.h"

@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <array>
-#include <cerrno>
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -10,6 +9,7 @@
 
 #include "common/descriptor.h"
 #include "common/files.h"
+#include "common/take_text.h"
 #include "common/text.h"
 #include "platform/processes/process_folder.h"
 
@@ -50,17 +50,11 @@ constexpr std::array<Ending, 18> kEndings = {{
 }};
 constexpr Ending kFailedRuns{"calSimErr", ".dat"};  ///< stands beside a setup without its name
 
-bool take(std::string_view& text, std::string_view front) {
-  if (!text.starts_with(front)) return false;
-  text.remove_prefix(front.size());
-  return true;
-}
-
 bool matches(std::string_view text, const Ending& ending) {
   if (text.ends_with(kTemporaryEnding)) text.remove_suffix(kTemporaryEnding.size());
-  if (!take(text, ending.stem) || (ending.isNumbered && !takeNumber(text))) return false;
+  if (!takeText(text, ending.stem) || (ending.isNumbered && takeDigits(text).empty())) return false;
   if (text == ending.extension) return true;
-  return take(text, ".") && takeNumber(text) && text == ending.extension;
+  return takeText(text, ".") && !takeDigits(text).empty() && text == ending.extension;
 }
 
 /// Whether the file names this program in one of its first lines, as every log and result file does.
@@ -71,7 +65,7 @@ bool namesThisProgram(const std::string& path) {
   if (length <= 0) return false;
   const auto lines = splitLines({head.data(), static_cast<std::size_t>(length)});
   return std::any_of(lines.begin(), lines.end(), [](std::string_view line) {
-    take(line, "# ");
+    takeText(line, "# ");
     return line.starts_with("Mirevo ");
   });
 }
@@ -83,16 +77,10 @@ bool isProcessFolder(const std::string& path) {
   if (mark == std::string::npos) return false;
   std::string_view number = std::string_view(path).substr(mark + kMark.size());
   struct stat status {};
-  return takeNumber(number) && number.empty() && ::stat((path + "/" + kBatchLogName).c_str(), &status) == 0;
+  return !takeDigits(number).empty() && number.empty() && ::stat((path + "/" + kBatchLogName).c_str(), &status) == 0;
 }
 
 }  // namespace
-
-bool takeNumber(std::string_view& text) {
-  const auto end = std::min(text.find_first_not_of("0123456789"), text.size());
-  text.remove_prefix(end);
-  return end > 0;
-}
 
 RunMadeEntries::RunMadeEntries(std::string folder, std::span<const std::string> names) : folder_(std::move(folder)) {
   for (const std::string& name : names) {
@@ -110,7 +98,7 @@ bool RunMadeEntries::contains(std::string_view name) const {
 
 bool RunMadeEntries::belongsToRunOf(std::string_view setup, std::string_view name) const {
   std::string_view rest = name;
-  if (!take(rest, setup)) return false;
+  if (!takeText(rest, setup)) return false;
   const auto* ending =
       std::find_if(kEndings.begin(), kEndings.end(), [rest](const Ending& each) { return matches(rest, each); });
   if (ending == kEndings.end()) return false;

@@ -24,7 +24,4 @@ class RunMadeEntries final {
   std::vector<std::string> setups_;  ///< names without ".kdx"
 };
 
-/// Takes a decimal number off the front of `text`; false when there is none.
-bool takeNumber(std::string_view& text);
-
 }  // namespace mirevo

@@ -8,21 +8,11 @@
 #include "common/calendar.h"
 #include "common/files.h"
 #include "common/text.h"
+#include "common/utf8.h"
 #include "platform/series/csv_cells.h"
 
 namespace mirevo {
 namespace {
-
-constexpr std::string_view kByteOrderMark = "\xEF\xBB\xBF";
-
-/// A cell as a message shows it: in quotes, on one line and not long.
-std::string quoteFound(std::string_view text) {
-  constexpr std::size_t kLongest = 60;
-  std::string shown = "\"";
-  for (const char c : text.substr(0, kLongest)) shown += static_cast<unsigned char>(c) < ' ' ? '?' : c;
-  shown += text.size() > kLongest ? "...\"" : "\"";
-  return shown;
-}
 
 std::string_view viewOf(const char* begin, const char* end) {
   return {begin, static_cast<std::size_t>(end - begin)};
@@ -98,7 +88,7 @@ bool CsvTimeSeries::readMissingMark(std::string_view line) {
   const std::optional<float> value = csv::parseCell(text.data(), text.data() + text.size());
   if (!value || text.empty()) {
     const char* const at = text.empty() ? line.data() + line.size() : text.data();
-    return fail(at, "a number after \"# missing =\"", quoteFound(text));
+    return fail(at, "a number after \"# missing =\"", quotedForMessage(text));
   }
   deleteValue_ = *value;
   return true;
@@ -108,12 +98,13 @@ bool CsvTimeSeries::readHeader(std::string_view line) {
   const char* const end = line.data() + line.size();
   const std::optional<char> separator = findSeparator(line);
   if (!separator) {
-    return fail(line.data(), "a header row with its columns separated by comma, semicolon or tab", quoteFound(line));
+    return fail(line.data(), "a header row with its columns separated by comma, semicolon or tab",
+                quotedForMessage(line));
   }
   separator_ = *separator;
   const char* cell = line.data();
   if (csv::DateScanner().scanCell(cell, end)) {
-    return fail(line.data(), "a header row before the first time step", quoteFound(line));
+    return fail(line.data(), "a header row before the first time step", quotedForMessage(line));
   }
   cell = csv::endOfCell(line.data(), end, separator_);
   while (cell != end) {
@@ -149,7 +140,7 @@ bool CsvTimeSeries::readRow(const char* line, const char* lineEnd, csv::DateScan
   const std::optional<std::int64_t> now = dates.scanCell(at, lineEnd);
   if (!now || (at != lineEnd && *at != separator_)) {
     const char* const cellEnd = csv::endOfCell(line, lineEnd, separator_);
-    return fail(line, "a valid time like 2001-01-31 12:30", quoteFound(csv::cellText(line, cellEnd)));
+    return fail(line, "a valid time like 2001-01-31 12:30", quotedForMessage(csv::cellText(line, cellEnd)));
   }
   if (!times_.empty() && *now <= second) {
     return fail(line, "a time later than " + formatDate(dateOfSecond(second)), formatDate(dateOfSecond(*now)));
@@ -202,7 +193,7 @@ bool CsvTimeSeries::readItem(std::size_t place) {
     if (!slow) {
       values.clear();
       return fail(cell, "a number of at most 3.4028235e38 in size, an empty cell, NaN or NA",
-                  quoteFound(csv::cellText(cell, cellEnd)));
+                  quotedForMessage(csv::cellText(cell, cellEnd)));
     }
     values.push_back(*slow);
   }

@@ -3,7 +3,6 @@
 #include <cmath>
 #include <limits>
 #include <optional>
-#include <string_view>
 
 #include <fmt/format.h>
 #include <netcdf.h>

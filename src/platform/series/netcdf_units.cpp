@@ -2,10 +2,10 @@
 
 #include <algorithm>
 #include <array>
-#include <charconv>
 #include <utility>
 
 #include "common/calendar.h"
+#include "common/take_text.h"
 #include "common/text.h"
 
 namespace mirevo {
@@ -33,74 +33,44 @@ std::optional<double> secondsOf(std::string_view unit) {
   return std::nullopt;
 }
 
-/// A number of at most `digits` digits at the front of `text`, which is moved past it.
-std::optional<int> takeNumber(std::string_view& text, std::size_t digits) {
-  int number = 0;
-  const char* const last = text.data() + std::min(digits, text.size());
-  if (text.empty() || text.front() == '-') return std::nullopt;
-  const auto [end, error] = std::from_chars(text.data(), last, number);
-  if (error != std::errc{}) return std::nullopt;
-  text.remove_prefix(static_cast<std::size_t>(end - text.data()));
-  return number;
-}
-
-bool takeCharacter(std::string_view& text, char c) {
-  if (text.empty() || text.front() != c) return false;
-  text.remove_prefix(1);
-  return true;
-}
-
 /// The `: minutes [: seconds [. zeros]]` after the hours.
 bool takeMinutesAndSeconds(std::string_view& text, DateRecord& date) {
-  if (!takeCharacter(text, ':')) return true;
-  const std::optional<int> minute = takeNumber(text, 2);
+  if (!takeText(text, ":")) return true;
+  const auto minute = takeNumber(text, 1, 2);
   if (!minute) return false;
-  date[date_field::kMinute] = *minute;
-  if (!takeCharacter(text, ':')) return true;
-  const std::optional<int> second = takeNumber(text, 2);
+  date[date_field::kMinute] = static_cast<std::int32_t>(*minute);
+  if (!takeText(text, ":")) return true;
+  const auto second = takeNumber(text, 1, 2);
   if (!second || *second > 59) return false;
-  date[date_field::kSecond] = *second;
-  if (takeCharacter(text, '.')) {
-    while (takeCharacter(text, '0')) {
-    }
-  }
+  date[date_field::kSecond] = static_cast<std::int32_t>(*second);
+  if (takeText(text, ".")) text.remove_prefix(std::min(text.find_first_not_of('0'), text.size()));
   return true;
 }
 
 /// The whole of `text` as the date of an origin.
 std::optional<DateRecord> parseOrigin(std::string_view text) {
-  DateRecord date{};
-  const std::optional<int> year = takeNumber(text, 4);
-  if (!year || !takeCharacter(text, '-')) return std::nullopt;
-  const std::optional<int> month = takeNumber(text, 2);
-  if (!month || !takeCharacter(text, '-')) return std::nullopt;
-  const std::optional<int> day = takeNumber(text, 2);
-  if (!day) return std::nullopt;
-  date[date_field::kYear] = *year;
-  date[date_field::kMonth] = *month;
-  date[date_field::kDay] = *day;
-  const bool hasT = takeCharacter(text, 'T');
+  std::optional<DateRecord> date = takeDay(text, 1);
+  if (!date) return std::nullopt;
+  const bool hasT = takeText(text, "T");
   if (!hasT) text = trim(text);
-  if (const std::optional<int> hour = takeNumber(text, 2)) {
-    date[date_field::kHour] = *hour;
-    if (!takeMinutesAndSeconds(text, date)) return std::nullopt;
+  if (const auto hour = takeNumber(text, 1, 2)) {
+    (*date)[date_field::kHour] = static_cast<std::int32_t>(*hour);
+    if (!takeMinutesAndSeconds(text, *date)) return std::nullopt;
   } else if (hasT) {
     return std::nullopt;
   }
   const std::string zone = toLowerAscii(trim(text));
   for (const std::string_view utc : {"", "z", "utc", "gmt", "+0", "-0", "+00", "+0:00", "+00:00", "-00:00", "+0000"}) {
-    if (zone == utc && isValidDate(date)) return date;
+    if (zone == utc && isValidDate(*date)) return date;
   }
   return std::nullopt;
 }
 
-/// dayNumber() of a date of the Julian calendar, in which every fourth year is a leap year. Its 1582-10-05 is the
-/// Gregorian 1582-10-15.
-std::int64_t julianDayNumber(int year, int month, int day) {
-  const std::int64_t y = month <= 2 ? year - 1 : year;
-  const std::int64_t fourYears = (y >= 0 ? y : y - 3) / 4;
-  constexpr std::int64_t kTwoDays = 2;  // Julian 0000-03-01 is two days before the Gregorian one
-  return y * 365 + fourYears + (153 * ((month + 9) % 12) + 2) / 5 + day - 1 - kTwoDays;
+/// How many days later the Gregorian calendar has a date than the Julian one, in which every fourth year is a leap
+/// year: what is 1582-10-05 there is 1582-10-15 here.
+std::int64_t daysBehind(const DateRecord& date) {
+  const int lastFebruary = date[date_field::kYear] - (date[date_field::kMonth] <= 2 ? 1 : 0);
+  return lastFebruary < 0 ? -2 : lastFebruary / 100 - lastFebruary / 400 - 2;
 }
 
 }  // namespace
@@ -126,11 +96,8 @@ std::optional<TimeUnits> parseTimeUnits(std::string_view units, std::string_view
   reason.clear();
   TimeUnits result{*seconds, secondNumber(*origin)};
   if (isMixed && result.originSecond < secondNumber({1582, 10, 15})) {
-    const DateRecord& o = *origin;
     constexpr std::int64_t kDaySeconds = 86400;
-    result.originSecond +=
-        kDaySeconds * (julianDayNumber(o[date_field::kYear], o[date_field::kMonth], o[date_field::kDay]) -
-                       dayNumber(o[date_field::kYear], o[date_field::kMonth], o[date_field::kDay]));
+    result.originSecond += kDaySeconds * daysBehind(*origin);
   }
   return result;
 }

@@ -2,6 +2,10 @@
 
 #include <algorithm>
 #include <filesystem>
+#include <string_view>
+#include <vector>
+
+#include <fmt/format.h>
 
 #include "common/text.h"
 #include "platform/series/csv_time_series.h"
@@ -9,6 +13,21 @@
 
 namespace mirevo {
 namespace {
+
+template <class Format>
+std::unique_ptr<TimeSeriesObject> make() {
+  return std::make_unique<Format>();
+}
+
+/// The kinds of series files. A further one needs its pair of files and a row here.
+struct SeriesFormat {
+  std::string_view endings;  ///< of file names, in lower case, a blank between two
+  std::unique_ptr<TimeSeriesObject> (*make)();
+};
+constexpr SeriesFormat kFormats[] = {
+    {".csv .txt .tsv", make<CsvTimeSeries>},
+    {".nc", make<NetcdfTimeSeries>},
+};
 
 /// Index of the first step not earlier than `days`, counting steps within half a millisecond as at `days`; the number
 /// of steps when there is none. Widens its search from `hint` in doubling strides.
@@ -54,10 +73,16 @@ std::optional<float> extractValue(const TimeSeriesObject& series, int item, doub
 
 std::unique_ptr<TimeSeriesObject> createTimeSeriesObject(const std::string& fileName, std::string& reason) {
   const std::string ending = toLowerAscii(std::filesystem::path(trimTrailing(fileName)).extension().string());
-  if (ending == ".csv" || ending == ".txt" || ending == ".tsv") return std::make_unique<CsvTimeSeries>();
-  if (ending == ".nc") return std::make_unique<NetcdfTimeSeries>();
-  reason = "expected a time-series file name ending in .csv, .txt, .tsv or .nc, found " +
-           (ending.empty() ? std::string("no ending") : "\"" + ending + "\"");
+  std::vector<std::string_view> known;
+  for (const SeriesFormat& format : kFormats) {
+    for (const std::string_view each : splitAt(format.endings, ' ')) {
+      if (each == ending) return format.make();
+      known.push_back(each);
+    }
+  }
+  reason = fmt::format("expected a time-series file name ending in {} or {}, found {}",
+                       fmt::join(known.begin(), known.end() - 1, ", "), known.back(),
+                       ending.empty() ? "no ending" : "\"" + ending + "\"");
   return nullptr;
 }
 

@@ -7,15 +7,15 @@
 
 namespace mirevo {
 
-/// The little that a signal handler must reach: the program's only global state. Every member is lock-free.
+/// The data that signal handlers need: the program's only global state. Every member is lock-free.
 struct SignalState {
-  std::atomic<int> terminationLogUnit{0};  ///< a descriptor; nothing is written there while it is 0 or less
+  std::atomic<int> terminationLogUnit{0};  ///< a descriptor; 0 or less: none
   std::atomic<int> runLogDescriptor{-1};
-  std::atomic<int> resultFileDescriptor{-1};   ///< while it takes rows; not yet at its closing lines
+  std::atomic<int> resultFileDescriptor{-1};   ///< as long as rows are written; -1 from the closing lines on
   std::atomic<int> messageFileDescriptor{-1};  ///< of the progress records
-  std::atomic<int> heldSteps{0};               ///< EndingSignalsHeld that exist
-  std::atomic<bool> isEnding{false};           ///< a request to end the run was taken
-  /// Ends the model's processes, with async-signal-safe calls alone.
+  std::atomic<int> heldSteps{0};               ///< number of EndingSignalsHeld objects
+  std::atomic<bool> isEnding{false};           ///< a handler has begun to end the run
+  /// Ends the model's processes; async-signal-safe.
   std::atomic<void (*)()> haltProcesses{nullptr};
   std::atomic<bool> showsMessageBox{true};        ///< BUILDMODE is not "NIGHT"
   std::atomic<bool> writesStandardOutput{false};  ///< "NIGHT", and `G48` names no front end
@@ -25,21 +25,21 @@ static_assert(std::atomic<int>::is_always_lock_free && std::atomic<void (*)()>::
 
 inline SignalState signalState;
 
-/// Writes `prefix`, `text` and a line end with one write(2), of 512 bytes at most. Async-signal-safe; a failure is
+/// Writes `prefix`, `text` and a line end, at most 512 bytes, with one write(2). Async-signal-safe; failures are
 /// ignored.
 void writeLineFromSignal(int descriptor, std::string_view text, std::string_view prefix = {}) noexcept;
 
-/// The signals that ask the run to end, rather than tell of its crash.
+/// The signals that request the run's end; the others that are handled report a crash.
 inline constexpr std::array kEndingRequests{SIGINT, SIGTERM, SIGHUP, SIGQUIT, SIGXCPU};
 
 inline constexpr std::string_view kInterrupted = "Control-C send";
 inline constexpr std::string_view kTerminationRequest = "Termination request";
 
-/// Whether a run that left this message was asked by a signal to end, rather than crashed.
+/// Whether this message, the last of a run, says that a signal requested its end; else the run crashed.
 bool isEndingRequest(std::string_view message) noexcept;
 
-/// While one exists the requests to end the run wait, so that no file is left in the middle of a step. For the main
-/// thread; they may be nested.
+/// While such an object exists, signals that request the run's end wait, so that no step is interrupted half-way and no
+/// file is left incomplete. For the main thread; the objects may be nested.
 class EndingSignalsHeld final {
  public:
   EndingSignalsHeld();

@@ -16,15 +16,15 @@ bool hasKeyboard();
 /// Whether the environment asks for a locale with UTF-8 characters (LC_ALL, LC_CTYPE, LANG, in this order).
 bool wantsUtf8();
 
-/// Whether colour is welcome on a terminal: NO_COLOR is not set, or empty, and TERM is set and not "dumb".
+/// Whether to write in colour to a terminal: NO_COLOR is unset or empty, and TERM is set and not "dumb".
 bool wantsColour();
 
-/// Writes to standard output, whole; false when nobody takes it any more.
+/// Writes the whole text to standard output; false when nobody reads there any more.
 bool writeToOutput(std::string_view text);
 
-/// The terminal while it shows screens: keys come at once and without echo, Ctrl-C and Ctrl-Z among them, and what it
-/// showed before comes back in the end. Drawn with the control sequences of ECMA-48 and of the alternate screen, which
-/// every terminal program of today knows; a terminal library would decide no more than these for us.
+/// The terminal while it shows whole screens. Every key is read at once and without echo, also Ctrl-C and Ctrl-Z; what
+/// the terminal showed before is restored at the end. It is drawn with the control sequences of ECMA-48 and those of
+/// the alternate screen, which all terminal programs in use understand, so that no terminal library is needed.
 class TerminalScreen final {
  public:
   TerminalScreen();
@@ -48,8 +48,8 @@ class TerminalScreen final {
   bool isEntered_ = false;
 };
 
-/// The signals that a viewer lives by, taken in order from a descriptor that poll(2) can wait for, so that none of them
-/// interrupts it. Blocks them for the rest of the process.
+/// The signals that a viewer acts on. They are blocked for the rest of the process and read one by one from a
+/// descriptor that poll(2) can wait for, so that none of them interrupts the viewer.
 class SignalQueue final {
  public:
   SignalQueue();
@@ -57,11 +57,11 @@ class SignalQueue final {
   SignalQueue(const SignalQueue&) = delete;
   SignalQueue& operator=(const SignalQueue&) = delete;
 
-  /// Blocks them ahead of time, so that none is missed before there is a queue. Returns what was blocked before.
+  /// Blocks these signals before there is a queue, so that none is missed. Returns the signals blocked until then.
   static sigset_t block();
 
   int descriptor() const { return descriptor_; }
-  /// The next one, 0 when there is none.
+  /// The number of the next signal; 0 when there is none.
   int next() const;
 
  private:

@@ -3,6 +3,7 @@
 #include <fmt/format.h>
 
 #include "common/files.h"
+#include "common/paths.h"
 
 namespace mirevo {
 namespace {
@@ -35,8 +36,7 @@ void validateFileOpens(const std::string& path, std::string_view keyword, const 
 
 void validateInBaseFolder(const std::string& path, const std::string& baseFolder, std::string_view keyword,
                           const SetupSection& section) {
-  const std::string prefix = baseFolder == "/" ? baseFolder : baseFolder + "/";
-  if (path.size() > prefix.size() && path.starts_with(prefix)) return;
+  if (const auto below = pathInFolder(path, baseFolder); below && !below->empty()) return;
   section.refuse(
       fmt::format("Error: The file {} is not located in the base folder {}", shown(path, keyword, section), baseFolder),
       keyword,

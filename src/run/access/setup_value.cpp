@@ -5,6 +5,7 @@
 
 #include <fmt/format.h>
 
+#include "common/calendar.h"
 #include "common/text.h"
 #include "platform/kdx/kdx_value.h"
 
@@ -47,7 +48,7 @@ std::string found(const KdxValue& value) {
       return isWhole && parseInteger(text) ? text + ".0" : text;  // tells 2.0 from 2 where that is the fault
     }
     std::string operator()(const std::string& text) const { return "the text " + quotedForMessage(text); }
-    std::string operator()(const DateRecord& date) const { return "the date " + formatKdxDate(date); }
+    std::string operator()(const DateRecord& date) const { return "the date " + formatDate(date); }
   };
   return std::visit(Words{}, value.value);
 }
@@ -177,7 +178,7 @@ std::string formatSetupValue(const SetupValue& value) {
     std::string operator()(std::int32_t number) const { return std::to_string(number); }
     std::string operator()(double number) const { return formatReal(number); }
     std::string operator()(const std::string& text) const { return inQuotes(text); }
-    std::string operator()(const DateRecord& date) const { return formatKdxDate(date); }
+    std::string operator()(const DateRecord& date) const { return formatDate(date); }
     std::string operator()(const std::vector<double>& list) const {
       std::string text;
       for (const double number : list) text += (text.empty() ? "" : ", ") + formatReal(number);

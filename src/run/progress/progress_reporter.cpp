@@ -10,7 +10,7 @@
 #include <fmt/format.h>
 
 #include "common/descriptor_output.h"
-#include "common/text.h"
+#include "common/progress_messages.h"
 #include "platform/signals/signal_state.h"
 
 namespace mirevo {
@@ -78,7 +78,7 @@ void ProgressReporter::writeRecord(std::string_view kind, std::string_view text)
   if (messageUnit_ < 0) return;
   std::string record;
   if (messageUnit_ == kStandardOutput) {
-    if (kind != "MESSAG") return;
+    if (kind != progress::kMessage) return;
     record = " ";  // list-directed output begins with a blank
   } else {
     record = kind;
@@ -109,39 +109,25 @@ std::string ProgressReporter::messageFile() const {
 }
 
 void ProgressReporter::writeStatus(std::string_view text) {
-  writeRecord("STATUS", text);
-}
-void ProgressReporter::writeStatusLabel(std::string_view text) {
-  writeRecord("STALBL", text);
-}
-void ProgressReporter::writeMessage(std::string_view text) {
-  writeRecord("MESSAG", text);
-}
-void ProgressReporter::writeMessageLabel(std::string_view text) {
-  writeRecord("MESLBL", text);
-}
-void ProgressReporter::writeSpeed(std::string_view text) {
-  writeRecord("COMSPD", text);
-}
-void ProgressReporter::writeTimeLeft(std::string_view text) {
-  writeRecord("TIMLFT", text);
-}
-void ProgressReporter::writeProgress(std::string_view text) {
-  writeRecord("PROGRE", text);
+  writeRecord(progress::kStatus, text);
 }
 
-void ProgressReporter::progressStart(std::string_view origin) {
-  writeStatus("Initialisation");
-  writeMessage(fmt::format("Run started {}", origin));
-  writeProgress("0.0");
+void ProgressReporter::writeMessage(std::string_view text) {
+  writeRecord(progress::kMessage, text);
+}
+
+void ProgressReporter::progressStart(std::string_view startedAt, std::string_view host, int process) {
+  writeStatus(progress::kInitialisation);
+  writeMessage(progress::runStartedMessage(startedAt, host, process));
+  writeRecord(progress::kPercentage, "0.0");
 }
 
 void ProgressReporter::progressEvaluationLabel(int plannedEvaluations) {
   plannedEvaluations_ = plannedEvaluations;
   completedEvaluations_ = 0;
   times_.assign(1, clock_());
-  writeStatusLabel("Model evaluation");
-  writeMessageLabel(withNumber(" of %", plannedEvaluations));
+  writeRecord(progress::kStatusLabel, progress::kCountLabel);
+  writeRecord(progress::kMessageLabel, fmt::format("{}{}", progress::kOfPlanned, plannedEvaluations));
 }
 
 void ProgressReporter::progressStep() {
@@ -152,8 +138,8 @@ void ProgressReporter::progressStep() {
   if (seconds > 0.0) {
     const double perSecond = static_cast<double>(times_.size() - 1) / seconds;
     const int left = std::max(0, plannedEvaluations_ - completedEvaluations_);
-    writeSpeed(fmt::format("{:.6g}", perSecond));
-    writeTimeLeft(fmt::format("{:.0f}", left / perSecond));
+    writeRecord(progress::kSpeed, fmt::format("{:.6g}", perSecond));
+    writeRecord(progress::kTimeLeft, fmt::format("{:.0f}", left / perSecond));
   }
   writePercentage();
   isCancelled();
@@ -162,25 +148,23 @@ void ProgressReporter::progressStep() {
 void ProgressReporter::writePercentage() {
   if (plannedEvaluations_ <= 0) return;
   const double percent = std::min(100.0, 100.0 * completedEvaluations_ / plannedEvaluations_);
-  writeProgress(fmt::format("{:.1f}", percent));
+  writeRecord(progress::kPercentage, fmt::format("{:.1f}", percent));
 }
 
 void ProgressReporter::progressReplayed(int number, bool ok) {
   ++completedEvaluations_;
-  writeMessage(withNumber("Evaluation of parameter set No. % taken from the earlier run: ", number) +
-               (ok ? "OK" : "FAILED"));
+  writeMessage(progress::replayedMessage(number, ok));
   writePercentage();  // the next evaluation may take hours
   times_.assign(1, clock_());
 }
 
 void ProgressReporter::progressBest(int number, double aggregate, std::string_view foundAt) {
-  writeMessage(fmt::format("Best so far: {} (evaluation {}{}{})", formatReal(aggregate), number,
-                           foundAt.empty() ? "" : ", ", foundAt));
+  writeMessage(progress::bestMessage(aggregate, number, foundAt));
 }
 
 void ProgressReporter::progressEnd(std::string_view ending) {
-  writeStatus(fmt::format("Ended: {}", ending));
-  writeProgress("100.0");
+  writeStatus(std::string(progress::kEnded).append(ending));
+  writeRecord(progress::kPercentage, progress::kComplete);
   if (!closeMessageFile()) {
     problem_ = fmt::format("The end of the run may not be in {}: {}", messageFile(), std::strerror(errno));
   }

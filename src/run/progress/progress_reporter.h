@@ -26,15 +26,10 @@ class ProgressReporter final {
   std::string progressInit(std::string_view runFileName, std::string_view destination);
 
   void writeStatus(std::string_view text);
-  void writeStatusLabel(std::string_view text);
   void writeMessage(std::string_view text);
-  void writeMessageLabel(std::string_view text);
-  void writeSpeed(std::string_view text);
-  void writeTimeLeft(std::string_view text);
-  void writeProgress(std::string_view text);
 
-  /// The first records; `origin` says when, where and as what the run was started.
-  void progressStart(std::string_view origin);
+  /// The first records; `startedAt` as dateAndTimeWithZone() says it.
+  void progressStart(std::string_view startedAt, std::string_view host, int process);
   /// Before the first evaluation: `plannedEvaluations` is what progressStep() counts towards.
   void progressEvaluationLabel(int plannedEvaluations);
   /// After each completed evaluation: speed, time left and percentage; then looks for the kill file.

@@ -6,6 +6,7 @@
 #include <unistd.h>
 #include <utility>
 
+#include "common/descriptor_output.h"
 #include "common/file_copy.h"
 
 namespace mirevo {
@@ -53,15 +54,8 @@ void RunLog::write(std::string_view record) {
     return;
   }
   putBackIfRemoved(descriptor_, path_);  // where that fails the log goes on where nobody sees it, and so may the run
-  while (!record.empty()) {
-    const ssize_t written = ::write(descriptor_, record.data(), record.size());
-    if (written >= 0) {
-      record.remove_prefix(static_cast<std::size_t>(written));
-    } else if (errno != EINTR) {
-      if (writeError_.empty()) writeError_ = std::strerror(errno);
-      return;
-    }
-  }
+  const int error = writeWhole(descriptor_, record).error;
+  if (error != 0 && writeError_.empty()) writeError_ = std::strerror(error);
 }
 
 }  // namespace mirevo

@@ -10,6 +10,7 @@
 
 #include <fmt/format.h>
 
+#include "common/descriptor_output.h"
 #include "common/fatal_error.h"
 #include "common/file_copy.h"
 #include "common/files.h"
@@ -80,20 +81,14 @@ bool RecordFile::tryAppend(std::string_view record, std::string& reason) {
     failed_ = true;
     return false;
   }
-  const std::size_t length = record.size();
-  while (!record.empty()) {
-    const ssize_t written = ::write(descriptor_, record.data(), record.size());
-    if (written < 0 && errno == EINTR) continue;
-    if (written < 0) {
-      reason = std::strerror(errno);
-      failed_ = true;
-      // What fitted of the record is no record: readers of the file would take it for one.
-      if (::ftruncate(descriptor_, size_) != 0 && errno != EINVAL) reason += ", and its last line is cut off";
-      return false;
-    }
-    record.remove_prefix(static_cast<std::size_t>(written));
+  if (const int error = writeWhole(descriptor_, record).error; error != 0) {
+    reason = std::strerror(error);
+    failed_ = true;
+    // What fitted of the record is no record: readers of the file would take it for one.
+    if (::ftruncate(descriptor_, size_) != 0 && errno != EINVAL) reason += ", and its last line is cut off";
+    return false;
   }
-  size_ += static_cast<std::int64_t>(length);
+  size_ += static_cast<std::int64_t>(record.size());
   return true;
 }
 

@@ -31,15 +31,9 @@ bool namesAFileOfResults(const ResultSetting& setting) {
 
 /// The first `count` cells of a line and the rest of it, which may hold tabs of its own.
 std::vector<std::string> cellsOf(std::string_view line, std::size_t count) {
-  std::vector<std::string> cells;
-  while (cells.size() < count) {
-    const std::size_t tab = line.find('\t');
-    if (tab == std::string_view::npos) return {};
-    cells.emplace_back(line.substr(0, tab));
-    line.remove_prefix(tab + 1);
-  }
-  cells.emplace_back(line);
-  return cells;
+  const std::vector<std::string_view> cells = splitAt(line, '\t', count + 1);
+  if (cells.size() <= count) return {};
+  return {cells.begin(), cells.end()};
 }
 
 std::optional<std::uint64_t> unsignedNumber(std::string_view text, int base) {

@@ -1,9 +1,8 @@
 #include "run/results/result_table.h"
 
-#include <cmath>
-#include <limits>
 #include <optional>
 
+#include "common/data_table.h"
 #include "common/text.h"
 
 namespace mirevo {
@@ -12,26 +11,8 @@ namespace {
 constexpr std::string_view kFirstHeading = "Evaluation";
 constexpr std::size_t kLeadingColumns = 2;  ///< Evaluation and Status
 
-std::vector<std::string_view> splitAtTabs(std::string_view line) {
-  std::vector<std::string_view> cells;
-  while (true) {
-    const std::size_t tab = line.find('\t');
-    cells.push_back(line.substr(0, tab));
-    if (tab == std::string_view::npos) return cells;
-    line.remove_prefix(tab + 1);
-  }
-}
-
-/// The inverse of formatReal().
-std::optional<double> parseResult(std::string_view cell) {
-  if (cell == "NaN") return std::nan("");
-  if (cell == "Inf") return std::numeric_limits<double>::infinity();
-  if (cell == "-Inf") return -std::numeric_limits<double>::infinity();
-  return parseReal(cell);
-}
-
 std::optional<ResultTable::Row> readRow(std::string_view line, std::size_t columnCount) {
-  const std::vector<std::string_view> cells = splitAtTabs(line);
+  const std::vector<std::string_view> cells = splitAt(line, '\t');
   if (cells.size() != columnCount + kLeadingColumns) return std::nullopt;
   const auto number = parseInteger(cells[0]);
   const bool ok = cells[1] == "OK";
@@ -39,7 +20,7 @@ std::optional<ResultTable::Row> readRow(std::string_view line, std::size_t colum
   ResultTable::Row row{*number, ok, {}};
   row.values.reserve(columnCount);
   for (std::size_t i = kLeadingColumns; i < cells.size(); ++i) {
-    const auto value = parseResult(cells[i]);
+    const auto value = realCell(cells[i]);
     if (!value) return std::nullopt;
     row.values.push_back(*value);
   }
@@ -47,7 +28,7 @@ std::optional<ResultTable::Row> readRow(std::string_view line, std::size_t colum
 }
 
 bool readHeader(std::string_view line, ResultTable& table) {
-  const std::vector<std::string_view> cells = splitAtTabs(line);
+  const std::vector<std::string_view> cells = splitAt(line, '\t');
   if (cells.size() <= kLeadingColumns || cells[0] != kFirstHeading) return false;
   table.columns.assign(cells.begin() + kLeadingColumns, cells.end());
   return true;

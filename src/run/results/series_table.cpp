@@ -29,14 +29,6 @@ void appendCell(std::string& text, float value) {
   }
 }
 
-/// "1981-10-01T00:00:00"
-void appendTime(std::string& text, std::int64_t second) {
-  using namespace date_field;
-  const DateRecord date = dateOfSecond(second);
-  fmt::format_to(std::back_inserter(text), "\t{:04}-{:02}-{:02}T{:02}:{:02}:{:02}", date[kYear], date[kMonth],
-                 date[kDay], date[kHour], date[kMinute], date[kSecond]);
-}
-
 std::optional<std::int64_t> readTime(std::string_view text) {
   constexpr std::string_view kPattern = "0000-00-00T00:00:00";
   if (text.size() != kPattern.size()) return std::nullopt;
@@ -83,13 +75,8 @@ void readHeadLine(std::string_view line, SeriesTable& table) {
 }
 
 void readRow(std::string_view line, SeriesTable& table) {
-  std::array<std::string_view, 5> cells;
-  for (std::size_t i = 0; i < cells.size(); ++i) {
-    const std::size_t tab = line.find('\t');
-    if ((tab == std::string_view::npos) != (i + 1 == cells.size())) return;
-    cells[i] = line.substr(0, tab);
-    line.remove_prefix(tab == std::string_view::npos ? line.size() : tab + 1);
-  }
+  const std::vector<std::string_view> cells = splitAt(line, '\t');
+  if (cells.size() != 5) return;
   const auto second = readTime(cells[1]);
   const auto observed = readCell(cells[2]);
   const auto initial = readCell(cells[3]);
@@ -123,7 +110,7 @@ std::string seriesTableText(const SeriesTable& table) {
   for (const ShownSeries& series : table.series) {
     for (std::size_t i = 0; i < series.seconds.size(); ++i) {
       text += series.measure;
-      appendTime(text, series.seconds[i]);
+      text += '\t' + isoTime(series.seconds[i]);
       appendCell(text, series.observed[i]);
       appendCell(text, series.initial[i]);
       appendCell(text, series.best[i]);

@@ -5,6 +5,7 @@
 
 #include <fmt/format.h>
 
+#include "common/calendar.h"
 #include "common/text.h"
 #include "measures/statistics.h"
 #include "platform/kdx/kdx.h"
@@ -43,7 +44,7 @@ class Summary final {
   }
 
   void addMeasures() {
-    line("Evaluation period: {} to {}", formatKdxDate(config_.period.start), formatKdxDate(config_.period.end));
+    line("Evaluation period: {} to {}", formatDate(config_.period.start), formatDate(config_.period.end));
     line("Output measures: {}", config_.measures.size());
     for (const OutputMeasure& measure : config_.measures) {
       line("  {}: {}, weight {} (above {}), objective function {}", measure.name, statisticName(measure),

@@ -2,10 +2,10 @@
 
 #include <fmt/format.h>
 
+#include "common/calendar.h"
 #include "common/fatal_error.h"
 #include "common/text.h"
 #include "measures/dates.h"
-#include "platform/kdx/kdx.h"
 
 namespace mirevo {
 namespace {
@@ -73,7 +73,7 @@ std::optional<SettingRefusal> validateEvaluationPeriod(const EvaluationPeriod& p
   if (daysSince(period.start, period.end) >= 0.0) return std::nullopt;
   return SettingRefusal{
       "Error: End date of the evaluation period before its start date", "End_Date",
-      fmt::format("expected {} or later, found {}", formatKdxDate(period.start), formatKdxDate(period.end))};
+      fmt::format("expected {} or later, found {}", formatDate(period.start), formatDate(period.end))};
 }
 
 std::optional<SettingRefusal> validateMeasurementNumber(const OutputMeasure& measure) {

@@ -10,6 +10,7 @@
 
 #include "algorithms/searches/search_method.h"
 #include "common/data_table.h"
+#include "common/progress_messages.h"
 #include "common/settings/keyword_row.h"
 #include "evaluation/evaluator.h"
 #include "measures/objective_functions.h"
@@ -125,6 +126,6 @@ class Task {
 };
 
 /// How a task ends that has nothing else to say.
-inline constexpr std::string_view kEndOfTask = "Normal termination";
+inline constexpr std::string_view kEndOfTask = progress::kNormalTermination;
 
 }  // namespace mirevo

@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include "common/calendar.h"
+
 namespace mirevo {
 namespace {
 
@@ -130,7 +132,8 @@ TEST(Kdx, BoundsNestingAndTheLengthOfMessages) {
   EXPECT_EQ(diagnosis(nested(101)), "1:301: expected at most 100 sections inside each other");
   EXPECT_EQ(diagnosis("[A]\nx = " + std::string(100000, 'y')),
             "2:5: expected a number, a date or a text between quotes, found \"" + std::string(60, 'y') + "...\"");
-  EXPECT_EQ(quotedForMessage(std::string(59, 'y') + "\xC3\xA4\xC3\xA4"), "\"" + std::string(59, 'y') + "...\"")
+  EXPECT_EQ(diagnosis("[A]\nx = " + std::string(59, 'y') + "\xC3\xA4\xC3\xA4"),
+            "2:5: expected a number, a date or a text between quotes, found \"" + std::string(59, 'y') + "...\"")
       << "no half characters";
 }
 
@@ -155,7 +158,7 @@ TEST(Kdx, DatesAreTakenApartAndNotJudged) {
   };
   for (const auto& row : cases) {
     const auto date = parseKdxDate(row.text);
-    EXPECT_EQ(date ? formatKdxDate(*date) : "no date", row.formatted) << row.text;
+    EXPECT_EQ(date ? formatDate(*date) : "no date", row.formatted) << row.text;
   }
 }
 

@@ -28,7 +28,7 @@ class ProgressReporterTest : public ::testing::Test {
 TEST_F(ProgressReporterTest, AMessageFileHoldsOneRecordALineKindFirst) {
   folder_.write("basin._spi_", "left from an earlier and longer run, which must not show through\n");
   EXPECT_EQ(init(reporter_), "");
-  reporter_.progressStart("2026-11-21 04:10:09 +0100 on host, process 7");
+  reporter_.progressStart("2026-11-21 04:10:09 +0100", "host", 7);
   reporter_.progressEvaluationLabel(4);
   reporter_.writeMessage("two\nlines");
   now_ += 2.0;
@@ -51,7 +51,7 @@ TEST_F(ProgressReporterTest, StandardOutputTakesMessagesAloneAndNoneTakesNothing
     ProgressReporter reporter([this] { return now_; });
     EXPECT_EQ(init(reporter, destination), "");
     ::testing::internal::CaptureStdout();
-    reporter.progressStart("2026-11-21 04:10:09 +0100 on host, process 7");
+    reporter.progressStart("2026-11-21 04:10:09 +0100", "host", 7);
     reporter.progressEvaluationLabel(2);
     reporter.writeMessage("Evaluation of parameter set No. 1 initiated");
     reporter.progressStep();
@@ -92,7 +92,7 @@ TEST_F(ProgressReporterTest, OnlyAKillFileOfThisRunCancelsItAndForGood) {
 TEST_F(ProgressReporterTest, AMessageFileThatCannotBeOpenedIsReportedAndTheRunGoesOn) {
   std::filesystem::create_directories((folder_ / "basin._spi_"));
   EXPECT_TRUE(init(reporter_).starts_with("Unable to open TqQmon2 message file: " + (folder_ / "basin._spi_")));
-  reporter_.progressStart("2026-11-21 04:10:09 +0100 on host, process 7");
+  reporter_.progressStart("2026-11-21 04:10:09 +0100", "host", 7);
   reporter_.progressStep();
   EXPECT_FALSE(reporter_.isCancelled());
 }

@@ -1,0 +1,78 @@
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <string_view>
+
+/// The texts by which a run tells a viewer how it is going: those who write them and those who read them find both
+/// here. docs/progress-format.md describes them.
+namespace mirevo::progress {
+
+/// Kinds of records: what each line begins with.
+inline constexpr std::string_view kStatus = "STATUS";
+inline constexpr std::string_view kStatusLabel = "STALBL";
+inline constexpr std::string_view kMessageLabel = "MESLBL";
+inline constexpr std::string_view kMessage = "MESSAG";
+inline constexpr std::string_view kSpeed = "COMSPD";
+inline constexpr std::string_view kTimeLeft = "TIMLFT";
+inline constexpr std::string_view kPercentage = "PROGRE";
+
+/// The first status of a run, and what its last one begins with: how it ended follows.
+inline constexpr std::string_view kInitialisation = "Initialisation";
+inline constexpr std::string_view kEnded = "Ended: ";
+inline constexpr std::string_view kNormalTermination = "Normal termination";
+/// What the last two records of a run are, whole for signal handlers.
+inline constexpr std::string_view kComplete = "100.0";
+inline constexpr std::string_view kEndedRecord = "STATUSEnded: ";
+inline constexpr std::string_view kCompleteRecord = "PROGRE100.0";
+static_assert(kEndedRecord.starts_with(kStatus) && kEndedRecord.ends_with(kEnded));
+static_assert(kCompleteRecord.starts_with(kPercentage) && kCompleteRecord.ends_with(kComplete));
+
+/// The label of what is counted, and what its planned number stands behind.
+inline constexpr std::string_view kCountLabel = "Model evaluation";
+inline constexpr std::string_view kOfPlanned = " of ";
+
+/// The title of the setup stands behind it.
+inline constexpr std::string_view kTitle = "Title: ";
+
+/// Who runs, where and since when.
+struct RunOrigin {
+  std::optional<double> startedAt;  ///< seconds since 1970-01-01 UTC
+  std::string host;
+  std::int64_t process = 0;  ///< 0: not known
+};
+/// `startedAt` as dateAndTimeWithZone() says it.
+std::string runStartedMessage(std::string_view startedAt, std::string_view host, std::int64_t process);
+/// Nothing for another message; what such a message does not say stays unknown.
+std::optional<RunOrigin> readRunStarted(std::string_view message);
+
+/// How an evaluation ended.
+inline constexpr std::string_view kOk = "OK";
+inline constexpr std::string_view kFailed = "FAILED";
+inline constexpr std::string_view kConstraintsViolated = "FAILED - parameter constraints violated";
+inline constexpr std::string_view kModelRunError = "FAILED - model run error";
+
+/// "Evaluation of parameter set No. 87": what all messages about it begin with.
+std::string nameOfEvaluation(std::int64_t number);
+std::string initiatedMessage(std::int64_t number);
+std::string completedMessage(std::int64_t number, std::string_view outcome);
+/// Of one whose result was taken from an earlier run.
+std::string replayedMessage(std::int64_t number, bool ok);
+
+/// What a message about an evaluation says of it.
+enum class EvaluationNews { underWay, succeeded, failed };
+/// Nothing for a message that is about no evaluation.
+std::optional<EvaluationNews> readEvaluationMessage(std::string_view message);
+
+struct BestEvaluation {
+  double aggregate = 0.0;
+  std::int64_t evaluation = 0;
+  std::optional<double> foundAt;  ///< seconds since 1970-01-01 UTC
+};
+/// `foundAt` as dateAndTimeWithZone() says it; empty for one of an earlier run.
+std::string bestMessage(double aggregate, std::int64_t evaluation, std::string_view foundAt);
+/// Nothing for another message.
+std::optional<BestEvaluation> readBest(std::string_view message);
+
+}  // namespace mirevo::progress

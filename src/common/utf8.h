@@ -1,0 +1,25 @@
+#pragma once
+
+#include <cstddef>
+#include <string_view>
+
+namespace mirevo {
+
+inline constexpr std::string_view kByteOrderMark = "\xEF\xBB\xBF";
+
+/// A character of UTF-8 text (RFC 3629: no overlong form, no surrogate, nothing past U+10FFFF).
+struct Utf8Character {
+  char32_t code = 0;
+  std::size_t bytes = 1;
+  bool isValid = false;
+};
+
+/// The character that `text`, which is not empty, begins with: one invalid byte where it begins with none.
+Utf8Character firstCharacter(std::string_view text);
+
+/// Whether this byte stands inside a character and does not begin one.
+constexpr bool isInsideCharacter(char byte) {
+  return (static_cast<unsigned char>(byte) & 0xC0U) == 0x80U;
+}
+
+}  // namespace mirevo
