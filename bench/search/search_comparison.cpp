@@ -17,11 +17,11 @@
 #include "algorithms/searches/sce.h"
 #include "algorithms/surrogate/proposal_selector.h"
 #include "algorithms/test_functions.h"
+#include "evaluation/evaluator.h"
 
 namespace mirevo {
 namespace {
 
-using testing::TargetEvaluator;
 using testing::TestFunction;
 
 constexpr int kTrials = 100;
@@ -46,6 +46,33 @@ struct Outcome {
   bool isSuccess = false;
   int evaluations = 0;  ///< to the first value within the tolerance of the optimum
   double best = 0.0;
+};
+
+/// Evaluates a function; counts the evaluations and notes when the value first came within a tolerance of the optimum.
+class TargetEvaluator final : public Evaluator {
+ public:
+  explicit TargetEvaluator(TestFunction function, double tolerance = 1.0e-3)
+      : function_(std::move(function)), tolerance_(tolerance) {}
+
+  std::vector<EvaluationResult> evaluateParameterSets(std::span<const ParameterSet> sets, DispatchMode) override {
+    std::vector<EvaluationResult> results(sets.size());
+    for (std::size_t i = 0; i < sets.size(); ++i) {
+      const double value = function_.value(sets[i]);
+      results[i].number = ++evaluations;
+      results[i].aggregate = value;
+      if (evaluationsToTarget == 0 && value - function_.optimalValue <= tolerance_) evaluationsToTarget = evaluations;
+    }
+    return results;
+  }
+
+  bool hasHitTarget() const { return evaluationsToTarget > 0; }
+
+  int evaluations = 0;
+  int evaluationsToTarget = 0;  ///< 0 until the target is met
+
+ private:
+  TestFunction function_;
+  double tolerance_;
 };
 
 Outcome runTrial(const TestFunction& function, const Setting& setting, int seed) {

@@ -11,10 +11,8 @@
 
 #include "algorithms/numbers/uniform_generator.h"
 #include "algorithms/searches/search_algorithm.h"
-#include "evaluation/evaluator.h"
 
-/// Published test functions of global optimisation, and an evaluator over one of them. Used by the tests and by the
-/// benchmark of the searches.
+/// Published test functions of global optimisation. Used by the tests and by the benchmark of the searches.
 namespace mirevo::testing {
 
 struct TestFunction {
@@ -178,33 +176,6 @@ inline TestFunction shifted(TestFunction function, int seed) {
   };
   return function;
 }
-
-/// Evaluates a function; counts the evaluations and notes when the value first came within a tolerance of the optimum.
-class TargetEvaluator final : public Evaluator {
- public:
-  explicit TargetEvaluator(TestFunction function, double tolerance = 1.0e-3)
-      : function_(std::move(function)), tolerance_(tolerance) {}
-
-  std::vector<EvaluationResult> evaluateParameterSets(std::span<const ParameterSet> sets, DispatchMode) override {
-    std::vector<EvaluationResult> results(sets.size());
-    for (std::size_t i = 0; i < sets.size(); ++i) {
-      const double value = function_.value(sets[i]);
-      results[i].number = ++evaluations;
-      results[i].aggregate = value;
-      if (evaluationsToTarget == 0 && value - function_.optimalValue <= tolerance_) evaluationsToTarget = evaluations;
-    }
-    return results;
-  }
-
-  bool hasHitTarget() const { return evaluationsToTarget > 0; }
-
-  int evaluations = 0;
-  int evaluationsToTarget = 0;  ///< 0 until the target is met
-
- private:
-  TestFunction function_;
-  double tolerance_;
-};
 
 inline SearchBounds boundsOf(const TestFunction& function) {
   SearchBounds bounds{function.lower, function.upper, function.lower};

@@ -102,40 +102,29 @@ TEST(IncompleteGamma, HasItsValuesInEachBranch) {
 }
 
 TEST(SpecialFunctions, ReportAFaultWithItsMessageAndZero) {
-  using Call = double (*)(int&, const MessageSink&);
-  const std::string quantile =
-      " *** ERROR *** QUANTILE FUNCTION OF STANDARD NORMAL DISTRIBUTION : ARGUMENT OF FUNCTION INVALID";
-  const std::string gamma = " *** ERROR *** LOGARITHM OF GAMMA FUNCTION : ARGUMENT OUT OF RANGE";
-  const std::string psi = " *** ERROR *** EULER PSI FUNCTION : ARGUMENT OUT OF RANGE";
-  const std::string shape = " *** ERROR *** INCOMPLETE GAMMA INTEGRAL : SHAPE PARAMETER OUT OF RANGE";
-  const std::string argument = " *** ERROR *** INCOMPLETE GAMMA INTEGRAL : ARGUMENT OF FUNCTION OUT OF RANGE";
-  const std::pair<Call, std::string> cases[] = {
-      {[](int& f, const MessageSink& m) { return normalQuantile(0.0, f, m); }, quantile},
-      {[](int& f, const MessageSink& m) { return normalQuantile(1.0, f, m); }, quantile},
-      {[](int& f, const MessageSink& m) { return normalQuantile(-0.1, f, m); }, quantile},
-      {[](int& f, const MessageSink& m) { return normalQuantile(1.5, f, m); }, quantile},
-      {[](int& f, const MessageSink& m) { return normalQuantile(kNaN, f, m); }, quantile},
-      {[](int& f, const MessageSink& m) { return logGamma(0.0, f, m); }, gamma},
-      {[](int& f, const MessageSink& m) { return logGamma(2.1e36, f, m); }, gamma},
-      {[](int& f, const MessageSink& m) { return logGamma(kNaN, f, m); }, gamma},
-      {[](int& f, const MessageSink& m) { return digamma(0.0, f, m); }, psi},
-      {[](int& f, const MessageSink& m) { return digamma(-1.0, f, m); }, psi},
-      {[](int& f, const MessageSink& m) { return incompleteGamma(1.0, 0.0, 0.0, f, m); }, shape},
-      {[](int& f, const MessageSink& m) { return incompleteGamma(-1.0, -1.0, 0.0, f, m); }, shape},
-      {[](int& f, const MessageSink& m) { return incompleteGamma(1.0, kInfinity, 0.0, f, m); }, shape},
-      {[](int& f, const MessageSink& m) { return incompleteGamma(-1e-9, 1.0, 0.0, f, m); }, argument},
-      {[](int& f, const MessageSink& m) { return incompleteGamma(kNaN, 1.0, 0.0, f, m); }, argument},
+  const auto check = [](const std::string& message, const auto& call, std::initializer_list<double> arguments) {
+    for (const double argument : arguments) {
+      std::vector<std::string> messages;
+      int fault = 9;
+      EXPECT_EQ(call(argument, fault, [&](std::string_view text) { messages.emplace_back(text); }), 0.0) << message;
+      EXPECT_EQ(fault, 1) << message;
+      EXPECT_EQ(messages, std::vector<std::string>{" *** ERROR *** " + message});
+      fault = 9;
+      call(argument, fault, {});  // without a channel the fault alone is reported
+      EXPECT_EQ(fault, 1) << message;
+    }
   };
-  for (const auto& [call, message] : cases) {
-    std::vector<std::string> messages;
-    int fault = 9;
-    EXPECT_EQ(call(fault, [&](std::string_view text) { messages.emplace_back(text); }), 0.0) << message;
-    EXPECT_EQ(fault, 1) << message;
-    EXPECT_EQ(messages, std::vector<std::string>{message});
-    fault = 9;
-    call(fault, {});  // without a channel the fault alone is reported
-    EXPECT_EQ(fault, 1) << message;
-  }
+  using Sink = const MessageSink&;
+  const std::string gamma = "INCOMPLETE GAMMA INTEGRAL : ";
+  check("QUANTILE FUNCTION OF STANDARD NORMAL DISTRIBUTION : ARGUMENT OF FUNCTION INVALID", normalQuantile,
+        {0.0, 1.0, -0.1, 1.5, kNaN});
+  check("LOGARITHM OF GAMMA FUNCTION : ARGUMENT OUT OF RANGE", logGamma, {0.0, 2.1e36, kNaN});
+  check("EULER PSI FUNCTION : ARGUMENT OUT OF RANGE", digamma, {0.0, -1.0});
+  check(gamma + "SHAPE PARAMETER OUT OF RANGE",
+        [](double shape, int& fault, Sink sink) { return incompleteGamma(1.0, shape, 0.0, fault, sink); },
+        {0.0, -1.0, kInfinity});
+  check(gamma + "ARGUMENT OF FUNCTION OUT OF RANGE",
+        [](double x, int& fault, Sink sink) { return incompleteGamma(x, 1.0, 0.0, fault, sink); }, {-1e-9, kNaN});
 }
 
 }  // namespace
