@@ -1,6 +1,7 @@
 #include "common/files.h"
 
 #include <sys/stat.h>
+#include <tuple>
 #include <unistd.h>
 
 #include <gtest/gtest.h>
@@ -23,19 +24,16 @@ class Files : public testing::Test {
 };
 
 TEST_F(Files, AreReplacedByNewOnesWithTheModeAskedForOrTheirOwn) {
-  const struct {
-    unsigned mode;
-    bool isOwn;
-  } cases[] = {{0754, false}, {0640, true}, {0666, true}};
-  for (const auto& c : cases) {
-    const std::string path = folder_.write("a.txt", "an old and longer content", c.isOwn ? c.mode : 0600);
+  const std::tuple<unsigned, bool> cases[] = {{0754, false}, {0640, true}, {0666, true}};
+  for (const auto& [mode, isOwn] : cases) {
+    const std::string path = folder_.write("a.txt", "an old and longer content", isOwn ? mode : 0600);
     std::filesystem::create_hard_link(path, folder_ / "b.txt");
     const bool isReplaced =
-        c.isOwn ? replaceFile(path, "new", reason_) : writeByUnlinkAndCreate(path, "new", c.mode, reason_);
+        isOwn ? replaceFile(path, "new", reason_) : writeByUnlinkAndCreate(path, "new", mode, reason_);
     ASSERT_TRUE(isReplaced) << reason_;
     EXPECT_EQ(readTextFile(path, reason_), "new");
     EXPECT_EQ(folder_.read("b.txt"), "an old and longer content") << "the old file itself was written";
-    EXPECT_EQ(modeOf("a.txt"), c.mode);
+    EXPECT_EQ(modeOf("a.txt"), mode);
     std::filesystem::remove(folder_ / "b.txt");
   }
   const mode_t mask = ::umask(027);

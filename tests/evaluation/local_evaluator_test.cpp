@@ -1,5 +1,7 @@
 #include "evaluation/local_evaluator.h"
 
+#include <tuple>
+
 #include "evaluation/evaluation_fixture.h"
 #include "evaluation/fake_launcher.h"
 
@@ -29,6 +31,7 @@ class LocalEvaluatorTest : public EvaluationTest {
     batch.seconds = seconds;
     batch.failure = {BatchFailure::Kind::exitCode, 3, "run.sh exited with code 3"};
     batch.output = {"reading", "no convergence"};
+    batch.leftBehind = "run.sh left a process running";
     return batch;
   }
 };
@@ -47,20 +50,26 @@ TEST_F(LocalEvaluatorTest, OneSlotRunsOneSetAfterAnother) {
   EXPECT_LE(launcher.longestWait, 3.0);
 }
 
-TEST_F(LocalEvaluatorTest, EverySetsOutputIsSavedUnderItsNumberAndWarningsNameTheSet) {
+TEST_F(LocalEvaluatorTest, EverySetsOutputIsSavedUnderItsNumberAndAFailedOnesIsNot) {
   description_.savedFiles = {folder_ / "base/simulated.csv"};
   description_.savedFolder = folder_ / "run_Saved";
   FakeLauncher launcher([&](int start, const std::string&) { return start == 2 ? fails(1.0) : computes(3.0); });
   LocalEvaluator& evaluator = makeEvaluator(launcher, 2, 100);
-  evaluate(evaluator, {2.0, 4.0});
+  const EvaluationResult failed = evaluate(evaluator, {2.0, 4.0}).at(1);
+  EXPECT_THAT(failed.measureValues, ElementsAre(kFailedRunValue));
+  EXPECT_THAT(failed.objectiveValues, ElementsAre(kFailedRunValue));
+  EXPECT_EQ(failed.aggregate, kFailedRunValue);
+  EXPECT_EQ(failed.failure->reason, "run.sh exited with code 3");
+  EXPECT_THAT(failed.failure->lastOutput, ElementsAre("reading", "no convergence"));
   evaluate(evaluator, {9.0, 6.0});
   EXPECT_EQ(folder_.read("run_Saved/1/simulated.csv"), series(2.0));
   EXPECT_FALSE(folder_.exists("run_Saved/2/simulated.csv"));
   EXPECT_FALSE(folder_.exists("run_Saved/3"));  // not run
   EXPECT_EQ(folder_.read("run_Saved/4/simulated.csv"), series(6.0));
-  EXPECT_THAT(observer_.events,
-              testing::Contains("warning: Evaluation of parameter set No. 2: " +
-                                (folder_ / "run_Process2/simulated.csv") + " was not kept: No such file or directory"));
+  const std::string warning = "warning: Evaluation of parameter set No. 2: ";
+  EXPECT_THAT(observer_.events, testing::IsSupersetOf({warning + "run.sh left a process running",
+                                                       warning + (folder_ / "run_Process2/simulated.csv") +
+                                                           " was not kept: No such file or directory"}));
 }
 
 TEST_F(LocalEvaluatorTest, ResultsStandInTheOrderOfTheSetsWhateverEndsFirst) {
@@ -83,35 +92,19 @@ TEST_F(LocalEvaluatorTest, ResultsStandInTheOrderOfTheSetsWhateverEndsFirst) {
   EXPECT_EQ(second.at(0).number, 7);
 }
 
-TEST_F(LocalEvaluatorTest, AFailedRunHasTheFailedValueEverywhereAndTheRestGoesOn) {
-  FakeLauncher launcher([&](int start, const std::string&) { return start == 2 ? fails(1.0) : computes(1.0); });
-  LocalEvaluator& evaluator = makeEvaluator(launcher, 1, 10);
-  const auto results = evaluate(evaluator, {2.0, 3.0, 4.0});
-  EXPECT_THAT(measuresOf(results), ElementsAre(1.0, kFailedRunValue, 3.0));
-  EXPECT_THAT(results[1].objectiveValues, ElementsAre(kFailedRunValue));
-  EXPECT_EQ(results[1].aggregate, kFailedRunValue);
-  EXPECT_EQ(results[1].failure->reason, "run.sh exited with code 3");
-  EXPECT_THAT(results[1].failure->lastOutput, ElementsAre("reading", "no convergence"));
-  EXPECT_THAT(observer_.events,
-              testing::Contains("Evaluation of parameter set No. 2 completed: FAILED - model run error"));
-}
-
 TEST_F(LocalEvaluatorTest, TheFailureAfterTheLimitEndsTheRunOnceItIsOnRecord) {
-  const struct {
-    int planned;
-    int fatalFailure;
-  } cases[] = {{1, 1}, {9, 1}, {10, 2}, {25, 3}};
-  for (const auto& c : cases) {
+  const std::tuple<int, int> cases[] = {{1, 1}, {9, 1}, {10, 2}, {25, 3}};
+  for (const auto& [planned, fatalFailure] : cases) {
     observer_.events.clear();
     FakeLauncher launcher([&](int, const std::string&) { return fails(1.0); });
-    LocalEvaluator& evaluator = makeEvaluator(launcher, 1, c.planned);
+    LocalEvaluator& evaluator = makeEvaluator(launcher, 1, planned);
     EXPECT_EQ(refusalOf([&] { evaluate(evaluator, std::vector(5, 2.0)); }),
               fmt::format("Error: Unable to continue. No of failed simulations too high.\n"
                           "failed evaluations: {}; at most {} may fail, a tenth of the {} planned\n"
                           "the last of them, No. {}: run.sh exited with code 3\n| reading\n| no convergence",
-                          c.fatalFailure, c.planned / 10, c.planned, c.fatalFailure));
-    EXPECT_EQ(observer_.events.back(), fmt::format("record {} a=2 FAILED", c.fatalFailure));
-    EXPECT_EQ(launcher.starts, c.fatalFailure);
+                          fatalFailure, planned / 10, planned, fatalFailure));
+    EXPECT_EQ(observer_.events.back(), fmt::format("record {} a=2 FAILED", fatalFailure));
+    EXPECT_EQ(launcher.starts, fatalFailure);
   }
 }
 
@@ -142,16 +135,6 @@ TEST_F(LocalEvaluatorTest, CancellationHaltsWhatRunsAndStartsNothing) {
   EXPECT_EQ(observer_.events.back(), "Simulation cancelled");
   EXPECT_THROW(evaluate(evaluator, std::vector(4, 2.0)), RunCancelled);
   EXPECT_EQ(launcher.starts, 2);
-}
-
-TEST_F(LocalEvaluatorTest, WarnsOfProcessesLeftBehind) {
-  FakeLauncher launcher([&](int, const std::string&) {
-    FakeLauncher::Batch batch = computes(1.0);
-    batch.leftBehind = "run.sh left a process running";
-    return batch;
-  });
-  evaluate(makeEvaluator(launcher, 1, 10), {2.0});
-  EXPECT_EQ(observer_.events.at(1), "warning: Evaluation of parameter set No. 1: run.sh left a process running");
 }
 
 TEST_F(LocalEvaluatorTest, SettlesTheTransformationFromTheSampleWithoutItsFailures) {

@@ -1,5 +1,7 @@
 #include "evaluation/model_run.h"
 
+#include <tuple>
+
 #include "evaluation/evaluation_fixture.h"
 #include "evaluation/evaluation_ledger.h"
 #include "evaluation/fake_launcher.h"
@@ -53,6 +55,7 @@ TEST_F(ModelRunTest, WhatAModelMayDoWrongIsAFailedEvaluationWithItsReason) {
       {"all missing", series(std::nan("")), Kind::resultsNotReadable, file + ": item No. 1 (flow) has missing values"},
       {"item gone", "time\n2001-01-01\n", Kind::resultsNotReadable, file},
       {"overflow", series(1e30), Kind::resultNotFinite, "output measure \"bias\" is Inf"},
+      {"good results of a batch that failed", series(4.0), Kind::signal, "why"},
   };
   description_.measures[0].statisticType = StatisticType::rootMeanSquare;  // squares 1e30 in 32 bits
   makeRunner(launcher_, 1);
@@ -60,7 +63,9 @@ TEST_F(ModelRunTest, WhatAModelMayDoWrongIsAFailedEvaluationWithItsReason) {
   for (const auto& c : cases) {
     batch_.write = nullptr;
     if (c.content != "-") writes("simulated.csv", c.content);
+    if (c.kind == Kind::signal) batch_.failure = {BatchFailure::Kind::signal, 11, "why"};
     const EvaluationResult result = evaluate(2.0);
+    batch_.failure = {};
     ASSERT_FALSE(result.ok()) << c.name;
     EXPECT_EQ(result.failure->kind, c.kind) << c.name;
     EXPECT_THAT(result.failure->reason, testing::StartsWith(c.reason)) << c.name;
@@ -70,24 +75,6 @@ TEST_F(ModelRunTest, WhatAModelMayDoWrongIsAFailedEvaluationWithItsReason) {
     // A good run in the same slot follows; then the next case must not find its results.
     writes("simulated.csv", series(4.0));
     EXPECT_THAT(evaluate(2.0).measureValues, ElementsAre(3.0)) << c.name;
-  }
-}
-
-TEST_F(ModelRunTest, BatchFailuresKeepTheirKind) {
-  makeRunner(launcher_, 1);
-  writes("simulated.csv", series(4.0));  // results beside a failure do not count
-  const struct {
-    BatchFailure::Kind batch;
-    Kind kind;
-  } cases[] = {{BatchFailure::Kind::exitCode, Kind::exitCode},
-               {BatchFailure::Kind::signal, Kind::signal},
-               {BatchFailure::Kind::couldNotStart, Kind::couldNotStart}};
-  for (const auto& c : cases) {
-    batch_.failure = {c.batch, 1, "why"};
-    const EvaluationResult result = evaluate(2.0);
-    ASSERT_FALSE(result.ok());
-    EXPECT_EQ(result.failure->kind, c.kind);
-    EXPECT_EQ(result.failure->reason, "why");
   }
 }
 
@@ -149,29 +136,28 @@ TEST_F(ModelRunTest, ARunThatStopsBeforeThePeriodIsAFailedEvaluation) {
 
 TEST_F(ModelRunTest, ARunThatMeetsFewerObservationsThanAnyBeforeIsNamedInAWarning) {
   makeRunner(launcher_, 1);
-  const struct {
-    const char* simulated;
-    const char* warning;  ///< its part that differs; none when empty
-  } cases[] = {{"2001-01-01,4\n2001-01-02,4\n2001-01-03,4\n2001-01-04,4\n2001-01-05,4\n", ""},
-               {"2001-01-01,4\n2001-01-02,4\n2001-01-03,4\n2001-01-04,4\n", "1 of 5"},
-               {"2001-01-01,4\n2001-01-02,4\n2001-01-03,4\n2001-01-04,NaN\n2001-01-05,4\n", ""},
-               {"2001-01-01,4\n2001-01-02,4\n", "3 of 5"},
-               {"2001-01-01,4\n2001-01-02,4\n", ""},
-               {"2001-01-01,4\n", "4 of 5"}};
+  // warning: its part that differs; none when empty
+  const std::tuple<const char*, const char*> cases[] = {
+      {"2001-01-01,4\n2001-01-02,4\n2001-01-03,4\n2001-01-04,4\n2001-01-05,4\n", ""},
+      {"2001-01-01,4\n2001-01-02,4\n2001-01-03,4\n2001-01-04,4\n", "1 of 5"},
+      {"2001-01-01,4\n2001-01-02,4\n2001-01-03,4\n2001-01-04,NaN\n2001-01-05,4\n", ""},
+      {"2001-01-01,4\n2001-01-02,4\n", "3 of 5"},
+      {"2001-01-01,4\n2001-01-02,4\n", ""},
+      {"2001-01-01,4\n", "4 of 5"}};
   FailedRunPolicy failedRuns(10);
   EvaluationLedger ledger(observer_, failedRuns);
   const std::vector<ParameterSet> sets(std::size(cases), {2.0});
   ledger.begin(sets, DispatchMode::task);
   std::string last;
-  for (const auto& c : cases) {
-    writes("simulated.csv", std::string("time,flow\n") + c.simulated);
+  for (const auto& [simulated, warning] : cases) {
+    writes("simulated.csv", std::string("time,flow\n") + simulated);
     const EvaluationResult result = evaluate(2.0);
     EXPECT_THAT(result.measureValues, ElementsAre(3.0));  // judged on what there is
     observer_.events.clear();
     ledger.finish(*ledger.takeNext(), result);
     last = observer_.events.front();
-    EXPECT_EQ(last.starts_with("warning: "), *c.warning != '\0') << last;
-    EXPECT_THAT(last, testing::HasSubstr(c.warning));
+    EXPECT_EQ(last.starts_with("warning: "), *warning != '\0') << last;
+    EXPECT_THAT(last, testing::HasSubstr(warning));
   }
   EXPECT_EQ(last,
             "warning: Evaluation of parameter set No. 6: output measure \"bias\": 4 of 5 observations in the "

@@ -1,6 +1,7 @@
 #include "parameters/template_file.h"
 
 #include <filesystem>
+#include <tuple>
 
 #include <fmt/format.h>
 #include <gmock/gmock.h>
@@ -65,10 +66,7 @@ TEST(ConvertIdTemplate, ReplacesIdValues) {
 }
 
 TEST(ConvertIdTemplate, RefusesUndefinedIdValues) {
-  const struct {
-    const char* line;
-    const char* token;
-  } cases[] = {
+  const std::tuple<const char*, const char*> cases[] = {
       {"x 2.0E-035", "2.0E-035"},
       {"see table-35", "table-35"},
       {"e-35", "e-35"},
@@ -77,9 +75,9 @@ TEST(ConvertIdTemplate, RefusesUndefinedIdValues) {
       {"x 99999999999e-35", "99999999999e-35"},
       {"x k=1e-35", "k=1e-35"},
   };
-  for (const auto& c : cases) {
-    EXPECT_THAT(refusalOf([&] { converted(std::string("first line\n") + c.line); }),
-                StartsWith(std::string("Error: Undefined parameter ID value ") + c.token +
+  for (const auto& [line, token] : cases) {
+    EXPECT_THAT(refusalOf([&] { converted(std::string("first line\n") + line); }),
+                StartsWith(std::string("Error: Undefined parameter ID value ") + token +
                            " found in template file\nmodel.tpl:2:"));
   }
 }
@@ -123,11 +121,7 @@ TEST(ParameterTemplate, FillsPlaceholders) {
 }
 
 TEST(ParameterTemplate, RefusesWhatItCannotFill) {
-  const struct {
-    const char* text;
-    const char* message;
-    const char* detail;
-  } cases[] = {
+  const std::tuple<const char*, const char*, const char*> cases[] = {
       {"", "Error: Delimiter not defined in template file t", "first line"},
       {"   \n!K!", "Error: Delimiter not defined in template file t", "first line"},
       {"1\n1K1", "Error: Delimiter not defined in template file t", "\"1\" is a character of numbers"},
@@ -139,9 +133,9 @@ TEST(ParameterTemplate, RefusesWhatItCannotFill) {
        "t:2:5: no parameter has the name that stands here between two !\ndid you mean \"Manning channel\"?"},
       {"!\n!k!", "Error: Parameter name k in template file k invalid", "did you mean \"K\"?"},
   };
-  for (const auto& c : cases) {
-    EXPECT_THAT(refusalOf([&] { ParameterTemplate("t", c.text, parameters()); }),
-                AllOf(StartsWith(c.message + std::string("\n")), HasSubstr(c.detail)));
+  for (const auto& [text, message, detail] : cases) {
+    EXPECT_THAT(refusalOf([&] { ParameterTemplate("t", text, parameters()); }),
+                AllOf(StartsWith(message + std::string("\n")), HasSubstr(detail)));
   }
 }
 

@@ -8,7 +8,6 @@
 #include "common/calendar.h"
 #include "common/text.h"
 #include "measures/statistics.h"
-#include "platform/kdx/kdx.h"
 
 namespace mirevo {
 namespace {

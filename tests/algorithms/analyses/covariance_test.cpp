@@ -1,7 +1,6 @@
 #include "algorithms/analyses/covariance.h"
 
 #include <cmath>
-#include <functional>
 #include <limits>
 
 #include <fmt/format.h>
@@ -71,15 +70,13 @@ TEST(ParameterCovariance, LeavesOutWhatHasNoVarianceByName) {
   EXPECT_THAT(result.kept, ElementsAre(0, 3));
   EXPECT_NEAR(result.covariance[1][1], 0.1 * 0.08, 1e-15);
   const SearchSpace space = spaceOf({1, 2, 3, 4, 5});
-  EXPECT_THAT(
-      formatCovariance(result, space, space.initial),
-      ::testing::IsSupersetOf({std::string("Parameter covariance: 5 observations, 2 parameters, 3 degrees of freedom"),
-                               std::string("Warning: Parameter b2 is left out of the covariance matrix: "
-                                           "no simulated value depends on it"),
-                               std::string("Warning: Parameter b3 is left out of the covariance matrix: "
-                                           "its derivatives are not known"),
-                               std::string("Warning: Parameter b5 is left out of the covariance matrix: "
-                                           "its effect cannot be told from that of the parameters before it")}));
+  EXPECT_THAT(formatCovariance(result, space, space.initial),
+              ::testing::IsSupersetOf<std::string>(
+                  {"Parameter covariance: 5 observations, 2 parameters, 3 degrees of freedom",
+                   "Warning: Parameter b2 is left out of the covariance matrix: no simulated value depends on it",
+                   "Warning: Parameter b3 is left out of the covariance matrix: its derivatives are not known",
+                   "Warning: Parameter b5 is left out of the covariance matrix: its effect cannot be told from that of "
+                   "the parameters before it"}));
 }
 
 TEST(ParameterCovariance, SaysWhenThereIsNothingToEstimateItFrom) {
@@ -115,67 +112,27 @@ TEST(ParameterLimits, AreTransformedForALogarithmicParameter) {
 }
 
 // Data and certified values: Statistical Reference Datasets, nonlinear regression, National Institute of Standards and
-// Technology (public domain), data sets Misra1a and Thurber.
-struct Certified {
-  const char* name;
-  std::vector<double> y, x;
-  std::function<double(const std::vector<double>&, double)> model;
-  std::vector<double> parameters, deviations;
-  double residualSumOfSquares, residualDeviation;
-};
-
-std::vector<Certified> certifiedSets() {
-  return {
-      {"Misra1a",
-       {10.07, 14.73, 17.94, 23.93, 29.61, 35.18, 40.02, 44.82, 50.76, 55.05, 61.01, 66.40, 75.47, 81.78},
-       {77.6, 114.9, 141.1, 190.8, 239.9, 289.0, 332.8, 378.4, 434.8, 477.3, 536.8, 593.1, 689.1, 760.0},
-       [](const std::vector<double>& b, double x) { return b[0] * (1.0 - std::exp(-b[1] * x)); },
-       {2.3894212918E+02, 5.5015643181E-04},
-       {2.7070075241E+00, 7.2668688436E-06},
-       1.2455138894E-01,
-       1.0187876330E-01},
-      {"Thurber",
-       {80.574,   84.248,   87.264,   87.195,   89.076,   89.608,   89.868,   90.101,   92.405,   95.854,
-        100.696,  101.060,  401.672,  390.724,  567.534,  635.316,  733.054,  759.087,  894.206,  990.785,
-        1090.109, 1080.914, 1122.643, 1178.351, 1260.531, 1273.514, 1288.339, 1327.543, 1353.863, 1414.509,
-        1425.208, 1421.384, 1442.962, 1464.350, 1468.705, 1447.894, 1457.628},
-       {-3.067, -2.981, -2.921, -2.912, -2.840, -2.797, -2.702, -2.699, -2.633, -2.481, -2.363, -2.322, -1.501,
-        -1.460, -1.274, -1.212, -1.100, -1.046, -0.915, -0.714, -0.566, -0.545, -0.400, -0.309, -0.109, -0.103,
-        0.010,  0.119,  0.377,  0.790,  0.963,  1.006,  1.115,  1.572,  1.841,  2.047,  2.200},
-       [](const std::vector<double>& b, double x) {
-         return (b[0] + x * (b[1] + x * (b[2] + x * b[3]))) / (1.0 + x * (b[4] + x * (b[5] + x * b[6])));
-       },
-       {1.2881396800E+03, 1.4910792535E+03, 5.8323836877E+02, 7.5416644291E+01, 9.6629502864E-01, 3.9797285797E-01,
-        4.9727297349E-02},
-       {4.6647963344E+00, 3.9571156086E+01, 2.8698696102E+01, 5.5675370270E+00, 3.1333340687E-02, 1.4984928198E-02,
-        6.5842344623E-03},
-       5.6427082397E+03,
-       1.3714600784E+01},
-  };
-}
-
+// Technology (public domain), data set Misra1a: y = b1 (1 - exp(-b2 x)).
 TEST(ParameterCovariance, ReproducesCertifiedStandardDeviations) {
-  for (const Certified& set : certifiedSets()) {
-    const SearchSpace space = spaceOf(set.parameters);
-    const PerturbationPlan plan =
-        planPerturbations({Differencing::central, PerturbationOption::value, 1e-4}, space, space.initial);
-    std::vector<std::vector<double>> simulated;
-    for (const ParameterSet& parameters : plan.sets) {
-      simulated.emplace_back();
-      for (const double x : set.x) simulated.back().push_back(set.model(parameters, x));
-    }
-    const auto model = linearise(plan, simulated, set.y, {});
-    ASSERT_TRUE(model.has_value());
-    double sumOfSquares = 0.0;
-    for (const double r : model->residuals) sumOfSquares += r * r;
-    EXPECT_NEAR(sumOfSquares / set.residualSumOfSquares, 1.0, 1e-9) << set.name << ": data or model differ";
-    const ParameterCovariance result = parameterCovariance(*model);
-    ASSERT_EQ(result.kept.size(), set.parameters.size()) << set.name;
-    EXPECT_NEAR(std::sqrt(result.errorVariance) / set.residualDeviation, 1.0, 1e-9);
-    for (std::size_t j = 0; j < set.parameters.size(); ++j) {
-      EXPECT_NEAR(result.standardDeviations[j] / set.deviations[j], 1.0, 1e-6) << set.name << " b" << j + 1;
-    }
+  const std::vector<double> x{77.6,  114.9, 141.1, 190.8, 239.9, 289.0, 332.8,
+                              378.4, 434.8, 477.3, 536.8, 593.1, 689.1, 760.0};
+  const std::vector<double> y{10.07, 14.73, 17.94, 23.93, 29.61, 35.18, 40.02,
+                              44.82, 50.76, 55.05, 61.01, 66.40, 75.47, 81.78};
+  const SearchSpace space = spaceOf({2.3894212918E+02, 5.5015643181E-04});
+  const PerturbationPlan plan =
+      planPerturbations({Differencing::central, PerturbationOption::value, 1e-4}, space, space.initial);
+  std::vector<std::vector<double>> simulated;
+  for (const ParameterSet& b : plan.sets) {
+    simulated.emplace_back();
+    for (const double at : x) simulated.back().push_back(b[0] * (1.0 - std::exp(-b[1] * at)));
   }
+  const auto model = linearise(plan, simulated, y, {});
+  ASSERT_TRUE(model.has_value());
+  const ParameterCovariance result = parameterCovariance(*model);
+  ASSERT_EQ(result.kept.size(), 2U);
+  EXPECT_NEAR(std::sqrt(result.errorVariance) / 1.0187876330E-01, 1.0, 1e-9);
+  EXPECT_NEAR(result.standardDeviations[0] / 2.7070075241E+00, 1.0, 1e-6);
+  EXPECT_NEAR(result.standardDeviations[1] / 7.2668688436E-06, 1.0, 1e-6);
 }
 
 }  // namespace

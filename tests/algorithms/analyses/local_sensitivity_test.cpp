@@ -1,6 +1,7 @@
 #include "algorithms/analyses/local_sensitivity.h"
 
 #include <cmath>
+#include <tuple>
 
 #include <fmt/format.h>
 #include <gmock/gmock.h>
@@ -41,13 +42,10 @@ constexpr auto kOfRange = PerturbationOption::range;
 constexpr auto kOfValue = PerturbationOption::value;
 
 TEST(PlanPerturbations, TakesItsStepsInsideTheBounds) {
-  struct Case {
-    const char* what;
-    Parameter parameter;
-    SensitivitySettings settings;  // differencing, option, fraction
-    double minus, plus;            // values of the parameter; equal: not perturbed
-  };
-  const Case cases[] = {
+  // settings: differencing, option, fraction
+  // minus: values of the parameter; equal: not perturbed
+  // plus: values of the parameter; equal: not perturbed
+  const std::tuple<const char*, Parameter, SensitivitySettings, double, double> cases[] = {
       {"forward, of the range", {kNone, 2, 0, 10}, {kForward, kOfRange, 0.1}, 2, 3},
       {"central, of the range", {kNone, 2, 0, 10}, {kCentral, kOfRange, 0.1}, 1, 3},
       {"of a negative value", {kNone, -2, -10, 10}, {kForward, kOfValue, 0.1}, -2, -1.8},
@@ -66,17 +64,17 @@ TEST(PlanPerturbations, TakesItsStepsInsideTheBounds) {
       {"integer at its largest value", {kInteger, 10, 0, 11}, {kForward, kOfRange, 0.01}, 9, 10},
       {"integer of one value", {kInteger, 4, 4, 5}, {kForward, kOfRange, 0.01}, 4, 4},
   };
-  for (const Case& c : cases) {
-    const SearchSpace space = spaceOf({{kNone, 7, 0, 14}, c.parameter});
-    const PerturbationPlan plan = planPerturbations(c.settings, space, space.initial);
+  for (const auto& [what, parameter, settings, minus, plus] : cases) {
+    const SearchSpace space = spaceOf({{kNone, 7, 0, 14}, parameter});
+    const PerturbationPlan plan = planPerturbations(settings, space, space.initial);
     EXPECT_EQ(plan.sets[0], space.initial);
     const ParameterDifference& difference = plan.differences[1];
-    EXPECT_DOUBLE_EQ(plan.sets[difference.minus][1], c.minus) << c.what;
-    EXPECT_DOUBLE_EQ(plan.sets[difference.plus][1], c.plus) << c.what;
-    EXPECT_EQ(difference.problem.empty(), c.minus < c.plus) << c.what;
-    EXPECT_DOUBLE_EQ(difference.width, c.plus - c.minus) << c.what;
-    EXPECT_EQ(plan.sets[difference.minus][0], 7.0) << c.what;
-    EXPECT_EQ(plan.sets[difference.plus][0], 7.0) << c.what;
+    EXPECT_DOUBLE_EQ(plan.sets[difference.minus][1], minus) << what;
+    EXPECT_DOUBLE_EQ(plan.sets[difference.plus][1], plus) << what;
+    EXPECT_EQ(difference.problem.empty(), minus < plus) << what;
+    EXPECT_DOUBLE_EQ(difference.width, plus - minus) << what;
+    EXPECT_EQ(plan.sets[difference.minus][0], 7.0) << what;
+    EXPECT_EQ(plan.sets[difference.plus][0], 7.0) << what;
   }
 }
 

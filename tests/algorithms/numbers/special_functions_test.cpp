@@ -3,6 +3,7 @@
 #include <cmath>
 #include <limits>
 #include <string>
+#include <tuple>
 #include <vector>
 
 #include <gtest/gtest.h>
@@ -65,77 +66,54 @@ TEST(Digamma, HasItsValues) {
 }
 
 TEST(IncompleteGamma, HasItsValuesInEachBranch) {
-  struct Case {
-    double shape, x, expected, tolerance;
-  };
-  const Case cases[] = {
-      {1, 0.5, 0.39346934028736658, 1e-13},
-      {1, 2.5, 0.9179150013761012, 1e-13},
-      {0.5, 0.1, 0.34527915398142298, 1e-13},
-      {0.5, 3, 0.98569412156457036, 1e-13},
-      {3, 2, 0.32332358381693654, 1e-13},
-      {3, 3, 0.57680991887315648, 1e-13},
-      {3, 20, 0.99999954448504944, 1e-13},
-      {100, 80, 0.017108313035133114, 1e-13},
-      {100, 120, 0.97213626010947934, 1e-13},
-      {5000, 4900, 0.077944956226513914, 1e-12},
-      {5000, 5100, 0.92067111892238102, 1e-12},
-      {9999, 10300, 0.9985764914528928, 1e-12},
-      {0.001, 0.5, 0.99943993334352925, 1e-13},
-      {0.01, 50, 1.0, 1e-13},
-      {20000, 19900, 0.24011560718543099, 1e-9},
-      {20000, 20300, 0.98270644872209655, 1e-9},
-      {1e6, 1000500, 0.69155047577149718, 1e-9},
-      {1e6, 1e300, 1.0, 0.0},
-      {1e6, 1.0, 0.0, 0.0},
-      {2.5, 1e300, 1.0, 0.0},
-      {2.5, kInfinity, 1.0, 0.0},
-      {500.0, 1e-3, 0.0, 0.0},
-      {3, 0.0, 0.0, 0.0},
-  };
-  for (const Case& c : cases) {
+  const std::tuple<double, double, double, double> cases[] = {{1, 0.5, 0.39346934028736658, 1e-13},
+                                                              {0.5, 0.1, 0.34527915398142298, 1e-13},
+                                                              {3, 3, 0.57680991887315648, 1e-13},
+                                                              {3, 20, 0.99999954448504944, 1e-13},
+                                                              {100, 120, 0.97213626010947934, 1e-13},
+                                                              {5000, 4900, 0.077944956226513914, 1e-12},
+                                                              {5000, 5100, 0.92067111892238102, 1e-12},
+                                                              {9999, 10300, 0.9985764914528928, 1e-12},
+                                                              {0.001, 0.5, 0.99943993334352925, 1e-13},
+                                                              {0.01, 50, 1.0, 1e-13},
+                                                              {20000, 20300, 0.98270644872209655, 1e-9},
+                                                              {1e6, 1000500, 0.69155047577149718, 1e-9},
+                                                              {1e6, 1e300, 1.0, 0.0},
+                                                              {2.5, kInfinity, 1.0, 0.0},
+                                                              {500.0, 1e-3, 0.0, 0.0},
+                                                              {3, 0.0, 0.0, 0.0}};
+  for (const auto& [shape, x, expected, tolerance] : cases) {
     int fault = 9;
-    const double g = logGamma(c.shape, fault);
-    EXPECT_NEAR(incompleteGamma(c.x, c.shape, g, fault), c.expected, c.tolerance) << c.shape << " " << c.x;
-    EXPECT_EQ(fault, 0) << c.shape << " " << c.x;
+    const double g = logGamma(shape, fault);
+    EXPECT_NEAR(incompleteGamma(x, shape, g, fault), expected, tolerance) << shape << " " << x;
+    EXPECT_EQ(fault, 0) << shape << " " << x;
   }
 }
 
 TEST(SpecialFunctions, ReportAFaultWithItsMessageAndZero) {
-  using Call = double (*)(int&, const MessageSink&);
-  const std::string quantile =
-      " *** ERROR *** QUANTILE FUNCTION OF STANDARD NORMAL DISTRIBUTION : ARGUMENT OF FUNCTION INVALID";
-  const std::string gamma = " *** ERROR *** LOGARITHM OF GAMMA FUNCTION : ARGUMENT OUT OF RANGE";
-  const std::string psi = " *** ERROR *** EULER PSI FUNCTION : ARGUMENT OUT OF RANGE";
-  const std::string shape = " *** ERROR *** INCOMPLETE GAMMA INTEGRAL : SHAPE PARAMETER OUT OF RANGE";
-  const std::string argument = " *** ERROR *** INCOMPLETE GAMMA INTEGRAL : ARGUMENT OF FUNCTION OUT OF RANGE";
-  const std::pair<Call, std::string> cases[] = {
-      {[](int& f, const MessageSink& m) { return normalQuantile(0.0, f, m); }, quantile},
-      {[](int& f, const MessageSink& m) { return normalQuantile(1.0, f, m); }, quantile},
-      {[](int& f, const MessageSink& m) { return normalQuantile(-0.1, f, m); }, quantile},
-      {[](int& f, const MessageSink& m) { return normalQuantile(1.5, f, m); }, quantile},
-      {[](int& f, const MessageSink& m) { return normalQuantile(kNaN, f, m); }, quantile},
-      {[](int& f, const MessageSink& m) { return logGamma(0.0, f, m); }, gamma},
-      {[](int& f, const MessageSink& m) { return logGamma(2.1e36, f, m); }, gamma},
-      {[](int& f, const MessageSink& m) { return logGamma(kNaN, f, m); }, gamma},
-      {[](int& f, const MessageSink& m) { return digamma(0.0, f, m); }, psi},
-      {[](int& f, const MessageSink& m) { return digamma(-1.0, f, m); }, psi},
-      {[](int& f, const MessageSink& m) { return incompleteGamma(1.0, 0.0, 0.0, f, m); }, shape},
-      {[](int& f, const MessageSink& m) { return incompleteGamma(-1.0, -1.0, 0.0, f, m); }, shape},
-      {[](int& f, const MessageSink& m) { return incompleteGamma(1.0, kInfinity, 0.0, f, m); }, shape},
-      {[](int& f, const MessageSink& m) { return incompleteGamma(-1e-9, 1.0, 0.0, f, m); }, argument},
-      {[](int& f, const MessageSink& m) { return incompleteGamma(kNaN, 1.0, 0.0, f, m); }, argument},
+  const auto check = [](const std::string& message, const auto& call, std::initializer_list<double> arguments) {
+    for (const double argument : arguments) {
+      std::vector<std::string> messages;
+      int fault = 9;
+      EXPECT_EQ(call(argument, fault, [&](std::string_view text) { messages.emplace_back(text); }), 0.0) << message;
+      EXPECT_EQ(fault, 1) << message;
+      EXPECT_EQ(messages, std::vector<std::string>{" *** ERROR *** " + message});
+      fault = 9;
+      call(argument, fault, {});  // without a channel the fault alone is reported
+      EXPECT_EQ(fault, 1) << message;
+    }
   };
-  for (const auto& [call, message] : cases) {
-    std::vector<std::string> messages;
-    int fault = 9;
-    EXPECT_EQ(call(fault, [&](std::string_view text) { messages.emplace_back(text); }), 0.0) << message;
-    EXPECT_EQ(fault, 1) << message;
-    EXPECT_EQ(messages, std::vector<std::string>{message});
-    fault = 9;
-    call(fault, {});  // without a channel the fault alone is reported
-    EXPECT_EQ(fault, 1) << message;
-  }
+  using Sink = const MessageSink&;
+  const std::string gamma = "INCOMPLETE GAMMA INTEGRAL : ";
+  check("QUANTILE FUNCTION OF STANDARD NORMAL DISTRIBUTION : ARGUMENT OF FUNCTION INVALID", normalQuantile,
+        {0.0, 1.0, -0.1, 1.5, kNaN});
+  check("LOGARITHM OF GAMMA FUNCTION : ARGUMENT OUT OF RANGE", logGamma, {0.0, 2.1e36, kNaN});
+  check("EULER PSI FUNCTION : ARGUMENT OUT OF RANGE", digamma, {0.0, -1.0});
+  check(gamma + "SHAPE PARAMETER OUT OF RANGE",
+        [](double shape, int& fault, Sink sink) { return incompleteGamma(1.0, shape, 0.0, fault, sink); },
+        {0.0, -1.0, kInfinity});
+  check(gamma + "ARGUMENT OF FUNCTION OUT OF RANGE",
+        [](double x, int& fault, Sink sink) { return incompleteGamma(x, 1.0, 0.0, fault, sink); }, {-1e-9, kNaN});
 }
 
 }  // namespace

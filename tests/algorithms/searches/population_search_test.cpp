@@ -1,5 +1,6 @@
 #include "algorithms/searches/population_search.h"
 
+#include <algorithm>
 #include <cmath>
 #include <limits>
 #include <map>
@@ -32,9 +33,15 @@ std::unique_ptr<PopulationSearch> makeSearch(Kind kind, int complexes, const Sea
   return std::make_unique<Pse>(PseSettings{complexes * (2 * n + 1)}, simplex, problem);
 }
 
+/// Looks after each loop whether the best point is kept.
 SearchSummary runToEnd(PopulationSearch& search) {
   EXPECT_EQ(search.initialise(), kSearchOk);
-  for (int loop = 0; loop < 100000 && !search.isTerminated(); ++loop) EXPECT_EQ(search.advance(), kSearchOk);
+  for (int loop = 0; loop < 100000 && !search.isTerminated(); ++loop) {
+    const double best = search.population().front().value();
+    EXPECT_EQ(search.advance(), kSearchOk);
+    EXPECT_FALSE(search.population().front().value() > best);
+    EXPECT_EQ(search.summary().best, search.population().front().set);
+  }
   EXPECT_TRUE(search.isTerminated());
   return search.summary();
 }
@@ -52,21 +59,18 @@ TEST_P(EitherSearch, FindsPublishedOptima) {
     std::string function;
     int complexes;
     int budget;
-    double tolerance;
   };
-  for (const Problem& problem : {Problem{"Goldstein-Price 2-D", 4, 600, 1e-3}, Problem{"Rosenbrock 2-D", 8, 1800, 1e-3},
-                                 Problem{"Six-hump camel-back 2-D", 4, 600, 1e-3},
-                                 Problem{"Griewank 2-D", 8, 1800, 1e-3}, Problem{"Shekel 4-D", 8, 3500, 1e-3},
-                                 Problem{"Hartman 6-D", 8, 2500, 1e-3}, Problem{"Ackley 10-D", 4, 5000, 1e-3}}) {
+  for (const Problem& problem :
+       {Problem{"Rosenbrock 2-D", 8, 1800}, Problem{"Six-hump camel-back 2-D", 4, 600},
+        Problem{"Griewank 2-D", 8, 1800}, Problem{"Hartman 6-D", 8, 2500}, Problem{"Ackley 10-D", 4, 5000}}) {
     for (const int seed : {1, 2, 3}) {
       const auto function = testing::shifted(testing::testFunction(problem.function), seed);
-      testing::TargetEvaluator evaluator(function);
+      FunctionEvaluator evaluator([&](const ParameterSet& x) { return resultOf(function.value(x)); });
       UniformGenerator random(seed);
       const auto search = makeSearch(GetParam(), problem.complexes,
                                      {boundsOf(function), onBudget(problem.budget), {}, {}, evaluator, random});
       const SearchSummary summary = runToEnd(*search);
-      EXPECT_NEAR(summary.bestResult.aggregate, function.optimalValue, problem.tolerance)
-          << problem.function << ", seed " << seed;
+      EXPECT_NEAR(summary.bestResult.aggregate, function.optimalValue, 1e-3) << problem.function << ", seed " << seed;
       EXPECT_EQ(function.value(summary.best), summary.bestResult.aggregate);
     }
   }
@@ -90,34 +94,11 @@ TEST_P(EitherSearch, KeepsToTheBudgetExactly) {
   }
 }
 
-TEST_P(EitherSearch, NeverLosesItsBestPointNorLeavesTheBounds) {
-  const SearchBounds bounds{{0, 0, 0}, {1, 2, 4}, {0, 1, 2}};
-  FunctionEvaluator evaluator([](const ParameterSet& x) { return resultOf(x[0] + (x[1] - 2) * (x[1] - 2) - x[2]); });
-  UniformGenerator random(9);
-  const auto search = makeSearch(GetParam(), 3, {bounds, onBudget(2000), {}, {}, evaluator, random});
-  ASSERT_EQ(search->initialise(), kSearchOk);
-  double best = search->population().front().value();
-  while (!search->isTerminated()) {
-    ASSERT_EQ(search->advance(), kSearchOk);
-    EXPECT_LE(search->population().front().value(), best);
-    best = search->population().front().value();
-    EXPECT_EQ(search->summary().bestResult.aggregate, best);
-  }
-  EXPECT_NEAR(best, -4.0, 1.0e-3);  // in a corner of the bounds
-  for (const auto& batch : evaluator.batches) {
-    for (const ParameterSet& set : batch) {
-      for (std::size_t j = 0; j < set.size(); ++j) {
-        ASSERT_GE(set[j], bounds.lower[j]);
-        ASSERT_LE(set[j], bounds.upper[j]);
-      }
-    }
-  }
-}
-
 TEST_P(EitherSearch, NeitherFixedParametersNorFailuresStallItOrMakeANotANumber) {
   const double nan = std::numeric_limits<double>::quiet_NaN();
   const std::vector<std::pair<std::string, FunctionEvaluator::Function>> functions{
       {"smooth", [](const ParameterSet& x) { return resultOf(x[0] * x[0] + x[2] * x[2]); }},
+      {"least in a corner", [](const ParameterSet& x) { return resultOf(x[0] - x[2] + 2.0); }},
       {"constant", [](const ParameterSet&) { return resultOf(1.0); }},
       {"half of it not a number", [nan](const ParameterSet& x) { return resultOf(x[0] < 0.3 ? nan : x[0]); }},
       {"never a number", [nan](const ParameterSet&) { return resultOf(nan); }},
@@ -156,8 +137,8 @@ TEST_P(EitherSearch, NeitherFixedParametersNorFailuresStallItOrMakeANotANumber) 
           ASSERT_TRUE(std::abs(set[0]) <= 1.0 && std::abs(set[2]) <= 1.0) << name;
         }
       }
-      if (name == "steps, as of integer parameters") {
-        EXPECT_EQ(summary.bestResult.aggregate, 0.0) << modelType;
+      if (name == "least in a corner" || name == "steps, as of integer parameters") {
+        EXPECT_NEAR(summary.bestResult.aggregate, 0.0, 1e-3) << name << modelType;
       }
     }
   }
@@ -272,18 +253,12 @@ TEST(Sce, RunsOneProposalOfEveryComplexAtATime) {
   EXPECT_EQ(evaluator.batches[1].size(), 6U);
 }
 
-TEST(Pse, RunsAGenerationInOneBatchAndKeepsItsBestPoint) {
+TEST(Pse, RunsAGenerationInOneBatch) {
   FunctionEvaluator evaluator([](const ParameterSet& x) { return resultOf(testing::rosenbrock(x)); });
   UniformGenerator random(3);
   PseSettings onlyMutations{22, 0.0, 0.0};
   Pse pse(onlyMutations, {3}, {{{-5, -2}, {5, 8}, {0, 0}}, onBudget(100), {}, {}, evaluator, random});
-  ASSERT_EQ(pse.initialise(), kSearchOk);
-  double best = pse.population().front().value();
-  while (!pse.isTerminated()) {
-    ASSERT_EQ(pse.advance(), kSearchOk);
-    EXPECT_LE(pse.population().front().value(), best);
-    best = pse.population().front().value();
-  }
+  runToEnd(pse);
   std::vector<std::size_t> sizes;
   for (const auto& batch : evaluator.batches) sizes.push_back(batch.size());
   EXPECT_THAT(sizes, ::testing::ElementsAre(22, 22, 22, 22, 12));
@@ -307,6 +282,26 @@ TEST(Pse, ReflectsThenContractsAndGivesAStuckPointUp) {
   }
   EXPECT_THAT(pse.population().back().set, ::testing::Not(::testing::ElementsAre(5, 7)));
   EXPECT_THAT(pse.population().front().set, ::testing::ElementsAre(5, 5));
+}
+
+/// A failed mutation between its moves does not let a point begin again: it is reflected in one generation at most.
+TEST(Pse, AMutationLeavesAPointItsPlaceInTheMoves) {
+  int reflections = 0;
+  for (int seed = 1; seed <= 20; ++seed) {
+    int count = 0;
+    FunctionEvaluator counting([&count](const ParameterSet&) { return resultOf(++count); });
+    UniformGenerator random(seed);
+    Pse pse({3, 0.5, 0.0}, {3}, fromThreePoints(counting, random));
+    ASSERT_EQ(pse.initialise(), kSearchOk);
+    for (int loop = 0; loop < 6; ++loop) ASSERT_EQ(pse.advance(), kSearchOk);
+    const auto hasReflection = [](const std::vector<ParameterSet>& batch) {
+      return std::ranges::any_of(batch, [](const ParameterSet& x) { return std::abs(x[0] - 6.05) < 1e-9; });
+    };
+    const auto generations = std::ranges::count_if(counting.batches, hasReflection);
+    EXPECT_LE(generations, 1) << seed;
+    reflections += static_cast<int>(generations);
+  }
+  EXPECT_GT(reflections, 10);
 }
 
 }  // namespace

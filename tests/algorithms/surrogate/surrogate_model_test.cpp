@@ -23,6 +23,19 @@ std::vector<double> valuesOf(const UnitPoints& points, Function function) {
   return values;
 }
 
+EvaluationResult resultOf(double value, bool hasFailed = false) {
+  EvaluationResult result;
+  result.aggregate = hasFailed ? kFailedRunValue : value;
+  if (hasFailed) result.failure.emplace();
+  return result;
+}
+
+void expectPredictions(const SurrogateModel& model, Function function, UniformGenerator& random, std::size_t size,
+                       double tolerance) {
+  for (const auto& point : latinHypercube(10, size, random))
+    EXPECT_NEAR(model.predict(point), function(point), tolerance);
+}
+
 double quadratic(const std::vector<double>& x) {
   return 3.0 + x[0] - 2.0 * x[1] * x[2] + 5.0 * x[2] * x[2];
 }
@@ -35,7 +48,7 @@ TEST(QuadraticSurrogate, ReproducesAQuadraticPolynomial) {
   const UnitPoints points = latinHypercube(30, 3, random);
   QuadraticSurrogate model;
   ASSERT_TRUE(model.fit(points, valuesOf(points, quadratic)));
-  for (const auto& point : latinHypercube(10, 3, random)) EXPECT_NEAR(model.predict(point), quadratic(point), 1.0e-5);
+  expectPredictions(model, quadratic, random, 3, 1.0e-5);
 }
 
 TEST(QuadraticSurrogate, StaysFiniteWhereThePointsDoNotDetermineIt) {
@@ -54,7 +67,7 @@ TEST(GaussianProcess, LearnsAWaveAndThatACoordinateHardlyMatters) {
   const UnitPoints points = latinHypercube(40, 2, random);
   GaussianProcess model;
   ASSERT_TRUE(model.fit(points, valuesOf(points, wave)));
-  for (const auto& point : latinHypercube(10, 2, random)) EXPECT_NEAR(model.predict(point), wave(point), 0.02);
+  expectPredictions(model, wave, random, 2, 0.02);
   EXPECT_GT(model.lengths()[1], 3.0 * model.lengths()[0]);
 }
 
@@ -77,7 +90,7 @@ TEST(GaussianProcess, IsNotHeldWhereAnEarlierFitHasEnded) {
   for (std::size_t i = 0; i < narrow.size(); ++i) noise.push_back(random.next());
   ASSERT_TRUE(model.fit(narrow, noise));
   ASSERT_TRUE(model.fit(points, valuesOf(points, wave)));
-  for (const auto& point : latinHypercube(10, 2, random)) EXPECT_NEAR(model.predict(point), wave(point), 0.02);
+  expectPredictions(model, wave, random, 2, 0.02);
 }
 
 TEST(GaussianProcess, KnowsTheSlopeOfItsDeviance) {
@@ -109,13 +122,12 @@ TEST(QuasiNewtonSearch, GoesDownAValleyAndStopsAtABound) {
                                   const double a = last[1] - last[0] * last[0];
                                   return std::vector<double>{-400.0 * a * last[0] - 2.0 * (1.0 - last[0]), 200.0 * a};
                                 }};
-  const LowPoint free = quasiNewtonSearch(function, {-1.2, 1.0}, {{-5, -5}, {5, 5}}, {0.5, 1.0e-12, 100});
-  EXPECT_LT(free.value, 1.0e-6);
-  const LowPoint bounded = quasiNewtonSearch(function, {-1.2, 1.0}, {{-5, -5}, {0.5, 5}}, {0.5, 1.0e-12, 100});
-  EXPECT_THAT(bounded.point, testing::ElementsAre(0.5, testing::DoubleNear(0.25, 1.0e-6)));
-  // From the bound itself, where each coordinate's slope depends on the other's value.
-  const LowPoint held = quasiNewtonSearch(function, {0.5, 4.0}, {{-5, -5}, {0.5, 5}}, {0.5, 1.0e-12, 100});
-  EXPECT_THAT(held.point, testing::ElementsAre(0.5, testing::DoubleNear(0.25, 1.0e-6)));
+  EXPECT_LT(quasiNewtonSearch(function, {-1.2, 1.0}, {{-5, -5}, {5, 5}}, {0.5, 1.0e-12, 100}).value, 1.0e-6);
+  // Also from the bound itself, where each coordinate's slope depends on the other's value.
+  for (const std::vector<double>& start : {std::vector{-1.2, 1.0}, {0.5, 4.0}}) {
+    const LowPoint bounded = quasiNewtonSearch(function, start, {{-5, -5}, {0.5, 5}}, {0.5, 1.0e-12, 100});
+    EXPECT_THAT(bounded.point, testing::ElementsAre(0.5, testing::DoubleNear(0.25, 1.0e-6)));
+  }
 }
 
 TEST(QuasiNewtonSearch, ComesBackFromWhereItsLastMovesFailed) {
@@ -145,11 +157,7 @@ TEST(ProposalSelector, RanksByPredictionAndLeavesFailuresOut) {
     ProposalSelector selector({40, 100, SurrogateModelType{type}, 2}, bounds);
     EXPECT_EQ(selector.proposalsPerRun(), 3U);
     for (int i = -5; i <= 5; ++i) {
-      EvaluationResult result;
-      result.aggregate = (i - 2.0) * (i - 2.0);
-      if (i == 2) result.failure.emplace();
-      if (i == 2) result.aggregate = kFailedRunValue;
-      selector.note({static_cast<double>(i)}, result);
+      selector.note({static_cast<double>(i)}, resultOf((i - 2.0) * (i - 2.0), i == 2));
     }
     EXPECT_FALSE(selector.isActive(1));
     EXPECT_TRUE(selector.isActive(2));
@@ -162,9 +170,7 @@ TEST(ProposalSelector, RanksByPredictionAndLeavesFailuresOut) {
 TEST(ProposalSelector, FindsTheModelsMinimumInItsNeighbourhoodOnce) {
   const SearchBounds bounds{{-10, 3, -10}, {10, 3, 10}, {0, 3, 0}};
   const auto at = [](double x, double y) {
-    EvaluationResult result;
-    result.aggregate = (x - 2.0) * (x - 2.0) + (x - 2.0) * (y + 1.0) + 3.0 * (y + 1.0) * (y + 1.0);
-    return result;
+    return resultOf((x - 2.0) * (x - 2.0) + (x - 2.0) * (y + 1.0) + 3.0 * (y + 1.0) * (y + 1.0));
   };
   for (const int type : {0, 1}) {
     ProposalSelector selector({50, 30, SurrogateModelType{type}, 1}, bounds);
@@ -201,9 +207,7 @@ TEST(ProposalSelector, MovesAnIntegerParameterOfFewValuesEitherWay) {
         UniformGenerator random(1);
         for (const auto& point : latinHypercube(18, 2, random)) {
           const ParameterSet set{values * point[0], point[1]};
-          EvaluationResult result;
-          result.aggregate = 10.0 * std::abs(std::floor(set[0]) - wanted) + (set[1] - 0.3) * (set[1] - 0.3);
-          selector.note(set, result);
+          selector.note(set, resultOf(10.0 * std::abs(std::floor(set[0]) - wanted) + std::pow(set[1] - 0.3, 2)));
         }
         const std::vector<PredictedMinimum> minima =
             selector.minima(std::vector<ParameterSet>{{values - 1.0 - wanted + 0.2, 0.8}});
@@ -218,10 +222,8 @@ TEST(ProposalSelector, StaysAwayFromWhereARunFailed) {
   const SearchBounds bounds{{1, 1}, {13, 13}, {1, 1}, {true, false}};
   ProposalSelector selector({25, 0, SurrogateModelType::quadraticPolynomial, 1}, bounds);
   const auto note = [&selector](double x, double y) {
-    EvaluationResult result;
-    result.aggregate = (std::floor(x) - 7) * (std::floor(x) - 7) + (y - 5) * (y - 5);
-    if (std::floor(x) == 7 && std::abs(y - 5) < 0.5) result.failure.emplace();
-    selector.note({x, y}, result);
+    const bool hasFailed = std::floor(x) == 7 && std::abs(y - 5) < 0.5;
+    selector.note({x, y}, resultOf(std::pow(std::floor(x) - 7, 2) + (y - 5) * (y - 5), hasFailed));
   };
   for (double x = 2; x <= 12; x += 2) {
     for (double y = 2; y <= 12; y += 2) note(x, y);
@@ -243,9 +245,7 @@ TEST(ProposalSelector, TakesIntegerParametersAsTheModelDoes) {
   for (const int type : {0, 1}) {
     ProposalSelector selector({25, 0, SurrogateModelType{type}, 1}, bounds);
     const auto note = [&](double x, double y) {
-      EvaluationResult result;
-      result.aggregate = std::abs(std::floor(x) - 4.0) + y * y;
-      selector.note({x, y}, result);
+      selector.note({x, y}, resultOf(std::abs(std::floor(x) - 4.0) + y * y));
     };
     for (const double x : {1.2, 1.7, 2.5, 3.0, 3.9, 5.1, 6.3, 6.6}) {
       for (const double y : {0.0, 0.4, 0.9}) note(x, y);

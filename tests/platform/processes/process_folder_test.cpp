@@ -1,7 +1,10 @@
 #include "platform/processes/process_folder.h"
 
 #include <fcntl.h>
+#include <map>
+#include <string>
 #include <sys/stat.h>
+#include <tuple>
 #include <unistd.h>
 
 #include <gmock/gmock.h>
@@ -73,10 +76,7 @@ TEST(ProcessFolder, LinksLeadWhereTheyShould) {
   const std::string copy = folder / "setup/run_Process1";
   makeProcessFolder(base, copy, folder / "setup/run_Process");
 
-  const struct {
-    const char* name;
-    std::string target;
-  } cases[] = {
+  const std::tuple<const char*, std::string> cases[] = {
       {"/inside_relative", "data/x.txt"},
       {"/inside_absolute", copy + "/data/x.txt"},
       {"/outside_relative", folder / "setup/model/shared/y.txt"},
@@ -84,65 +84,54 @@ TEST(ProcessFolder, LinksLeadWhereTheyShould) {
       {"/dangling", "nowhere"},
       {"/data/loop", "."},
   };
-  for (const auto& c : cases) EXPECT_EQ(fs::read_symlink(copy + c.name).string(), c.target) << c.name;
+  for (const auto& [name, target] : cases) EXPECT_EQ(fs::read_symlink(copy + name).string(), target) << name;
 }
 
 // A setup that lies in the model's own folder has what its runs make in what it copies.
 TEST(ProcessFolder, NeverCopiesWhatRunsMake) {
   const TemporaryFolder folder;
-  folder.write("run.sh", "");
-  folder.write("cal_Process2/big.dat", "");                             // of this run
-  folder.write("other_Process1/" + std::string(kBatchLogName), "log");  // of another setup's run
-  folder.write("my_Process1/data.txt", "mine");                         // somebody's own: no batch log
-  folder.write("cal_Processes/data.txt", "mine");
-  folder.write("in/deep/cal.KDX", "");
-  folder.write("in/deep/cal_Saved/1/out.csv", "");
-  for (const char* setup : {"cal.kdx", "cal.1.kdx"}) folder.write(setup, "");
-  const struct {
-    const char* name;
-    const char* content;
-    bool isCopied;
-  } files[] = {
-      {"cal_Saved/out.csv", "", false},
-      {"cal_Saved.12/out.csv", "", false},
-      {"cal_Saved.old/data.txt", "mine", true},
-      {"my_Saved/data.txt", "mine", true},  // no setup of that name
-      {"cal_Failed17/run.sh", "", false},
-      {"cal_Failed/run.sh", "mine", true},
-      {"cal_Optimisation.dat", "", false},
-      {"cal_Optimisation.3.dat", "", false},
-      {"cal_Optimisation.old.dat", "mine", true},
-      {"cal.1_Sensitivity.dat", "", false},
-      {"cal_Band_2.csv", "", false},
-      {"cal_Band_2.1.csv", "", false},
-      {"cal_Report.html", "", false},
-      {"cal_Series.dat", "", false},
-      {"cal_Series.dat.tmp", "", false},
-      {"calSimErr.dat.tmp", "", false},
-      {"cal.dat.tmp", "initial storages\n", true},
-      {"cal._spi_", "", false},
-      {"calSimErr.1.dat", "", false},
-      {"cal.log", "Warning: early\nMirevo 1.2, started\n", false},
-      {"cal.2.dat", "# Title\n# Mirevo 1.2\n", false},
-      {"cal.dat", "initial storages\n", true},  // the model's, as their content shows
-      {"cal.1.log", "", true},
-      {"cal.txt", "Mirevo ", true},
-      {"in/calSimErr.dat", "mine", true},  // no setup beside it
-  };
-  for (const auto& file : files) folder.write(file.name, file.content);
+  for (const char* setup : {"cal.kdx", "cal.1.kdx", "in/deep/cal.KDX"}) folder.write(setup, "");
+  const std::map<std::string, std::string> made{{"cal_Process2/big.dat", ""},  // of this run
+                                                {"other_Process1/" + std::string(kBatchLogName), "of another setup's"},
+                                                {"cal.log", "Warning: early\nMirevo 1.2, started\n"},
+                                                {"cal.2.dat", "# Title\n# Mirevo 1.2\n"}};
+  const char* const madeByName[] = {"in/deep/cal_Saved/1/out.csv",
+                                    "cal_Saved/out.csv",
+                                    "cal_Saved.12/out.csv",
+                                    "cal_Failed17/run.sh",
+                                    "cal_Optimisation.dat",
+                                    "cal_Optimisation.3.dat",
+                                    "cal.1_Sensitivity.dat",
+                                    "cal_Band_2.csv",
+                                    "cal_Band_2.1.csv",
+                                    "cal_Report.html",
+                                    "cal_Series.dat",
+                                    "cal_Series.dat.tmp",
+                                    "calSimErr.dat.tmp",
+                                    "cal._spi_",
+                                    "calSimErr.1.dat"};
+  const char* const mine[] = {"run.sh",
+                              "my_Process1/data.txt" /* no batch log */,
+                              "cal_Processes/data.txt",
+                              "cal_Saved.old/data.txt",
+                              "my_Saved/data.txt" /* no setup of that name */,
+                              "cal_Failed/run.sh",
+                              "cal_Optimisation.old.dat",
+                              "cal.dat.tmp",
+                              "cal.dat",
+                              "cal.1.log" /* by their content */,
+                              "cal.txt",
+                              "in/calSimErr.dat" /* no setup beside it */};
+  for (const auto& [name, content] : made) folder.write(name, content);
+  for (const char* name : madeByName) folder.write(name, "");
+  for (const char* name : mine) folder.write(name, name == std::string("cal.txt") ? "Mirevo " : "initial storages\n");
   for (int round = 0; round < 2; ++round)
     makeProcessFolder(folder.path(), folder / "cal_Process1", folder / "cal_Process");
-
-  EXPECT_TRUE(folder.exists("cal_Process1/run.sh"));
+  for (const auto& [name, content] : made) EXPECT_FALSE(folder.exists("cal_Process1/" + name)) << name;
+  for (const std::string name : madeByName) EXPECT_FALSE(folder.exists("cal_Process1/" + name)) << name;
+  for (const std::string name : mine) EXPECT_TRUE(folder.exists("cal_Process1/" + name)) << name;
   EXPECT_FALSE(folder.exists("cal_Process1/cal_Process1"));
-  EXPECT_FALSE(folder.exists("cal_Process1/cal_Process2"));
   EXPECT_FALSE(folder.exists("cal_Process1/other_Process1"));
-  EXPECT_TRUE(folder.exists("cal_Process1/my_Process1/data.txt"));
-  EXPECT_TRUE(folder.exists("cal_Process1/cal_Processes/data.txt"));
-  EXPECT_FALSE(folder.exists("cal_Process1/in/deep/cal_Saved"));
-  for (const auto& file : files) {
-    EXPECT_EQ(folder.exists(std::string("cal_Process1/") + file.name), file.isCopied) << file.name;
-  }
 }
 
 TEST(ProcessFolder, KnowsItsOwnBehindALink) {
@@ -157,15 +146,12 @@ TEST(ProcessFolder, KnowsItsOwnBehindALink) {
 TEST(ProcessFolder, NamesThePathThatCannotBeCopied) {
   const TemporaryFolder folder;
   folder.write("base/run.sh", "");
-  const struct {
-    const char* source;
-    const char* target;
-    std::string refusal;
-  } cases[] = {{"base", "no/such/run_Process", "create the folder " + folder / "no/such/run_Process1"},
-               {"missing", "run_Process", "read the folder " + folder / "missing"}};
-  for (const auto& c : cases) {
-    EXPECT_EQ(refusalOf([&] { makeProcessFolder(folder / c.source, folder / c.target + "1", folder / c.target); }),
-              "Unable to " + c.refusal + ": No such file or directory");
+  const std::tuple<const char*, const char*, std::string> cases[] = {
+      {"base", "no/such/run_Process", "create the folder " + folder / "no/such/run_Process1"},
+      {"missing", "run_Process", "read the folder " + folder / "missing"}};
+  for (const auto& [source, target, refusal] : cases) {
+    EXPECT_EQ(refusalOf([&] { makeProcessFolder(folder / source, folder / target + "1", folder / target); }),
+              "Unable to " + refusal + ": No such file or directory");
   }
 }
 

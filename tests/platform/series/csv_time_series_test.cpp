@@ -3,35 +3,22 @@
 #include <cmath>
 #include <fstream>
 #include <string>
+#include <tuple>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include "common/calendar.h"
+#include "platform/series/shown_values.h"
 
 namespace mirevo {
 namespace {
 
 using ::testing::ElementsAre;
 
-/// The item's values, -999999 where one is missing (NaN does not compare).
-std::vector<float> valuesOf(CsvTimeSeries& series, int item) {
-  EXPECT_TRUE(series.getData(item)) << series.lastError();
-  const auto values = series.values(item);
-  std::vector<float> shown(values.begin(), values.end());
-  for (float& value : shown) {
-    if (isMissing(value, series.deleteValue())) value = -999999.0F;
-  }
-  return shown;
-}
-
 TEST(CsvTimeSeries, ReadsEveryFormOfFile) {
-  struct Case {
-    const char* name;
-    std::string content;
-  };
   // Each is the same series: 1.5 at 2000-02-28 00:00, missing at 12:00, -200 at 24:00 (the 29th), 0.25 on the 1st.
-  const Case cases[] = {
+  const std::tuple<const char*, std::string> cases[] = {
       {"comma", "time,Q\n2000-02-28,1.5\n2000-02-28 12:00,\n2000-02-28 24:00,-2e2\n2000-03-01 00:00:00,.25\n"},
       {"semicolon, CRLF, no last line end",
        "time;Q\r\n2000-02-28;1.5\r\n2000-02-28T12:00;-nan\r\n2000-02-29;-200\r\n2000-03-01;0.25"},
@@ -44,27 +31,24 @@ TEST(CsvTimeSeries, ReadsEveryFormOfFile) {
       {"semicolon with commas in a name, NaN in capitals",
        "time;Q, m3/s, gauge\n2000-02-28;1.5\n2000-02-28 12:00;nAN\n2000-02-29;-200\n2000-03-01;0.25\n"},
   };
-  for (const Case& c : cases) {
-    SCOPED_TRACE(c.name);
+  for (const auto& [name, content] : cases) {
+    SCOPED_TRACE(name);
     CsvTimeSeries series;
-    ASSERT_TRUE(series.parse("q.csv", c.content)) << series.lastError();
+    ASSERT_TRUE(series.parse("q.csv", content)) << series.lastError();
     EXPECT_EQ(series.itemCount(), 1);
     EXPECT_EQ(formatDate(series.startTime().value()), "2000-02-28 00:00");
-    EXPECT_THAT(std::vector<double>(series.times().begin(), series.times().end()), ElementsAre(0.0, 0.5, 1.0, 2.0));
+    EXPECT_THAT(timesOf(series), ElementsAre(0.0, 0.5, 1.0, 2.0));
     EXPECT_THAT(valuesOf(series, 1), ElementsAre(1.5F, -999999.0F, -200.0F, 0.25F));
   }
 }
 
 TEST(CsvTimeSeries, RefusesWithThePlaceAndWhatWasExpected) {
-  struct Case {
-    std::string content;
-    std::string error;  ///< behind "s.csv:"
-  };
+  // error: behind "s.csv:"
   const std::string head = "# c\ntime,Q,H\n2001-01-31 00:00,1,2\n";
   const std::string noHeader =
       ":1: expected a header row (the time column's name, then one name an item), found the end of the file";
   const std::string noTime = "4:1: expected a valid time like 2001-01-31 12:30, found ";
-  const Case cases[] = {
+  const std::tuple<std::string, std::string> cases[] = {
       {"", "1" + noHeader},
       {"# only\n", "2" + noHeader},
       {"time Q\n",
@@ -86,10 +70,10 @@ TEST(CsvTimeSeries, RefusesWithThePlaceAndWhatWasExpected) {
       {head + "2001-02-01,1,2,\r\n", "4:1: expected 3 columns as in the header row, found 4"},
       {head + "2001-02-01,\"1,2\n", "4:1: expected 3 columns as in the header row, found 2"},
   };
-  for (const Case& c : cases) {
+  for (const auto& [content, error] : cases) {
     CsvTimeSeries series;
-    EXPECT_FALSE(series.parse("s.csv", c.content)) << c.content;
-    EXPECT_EQ(series.lastError(), "s.csv:" + c.error);
+    EXPECT_FALSE(series.parse("s.csv", content)) << content;
+    EXPECT_EQ(series.lastError(), "s.csv:" + error);
     EXPECT_EQ(series.timeStepCount(), 0);
   }
 }

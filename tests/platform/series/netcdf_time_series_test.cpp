@@ -1,9 +1,10 @@
 #include "platform/series/netcdf_time_series.h"
 
+#include <array>
 #include <cstdio>
 #include <filesystem>
-#include <fstream>
 #include <numeric>
+#include <tuple>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -11,6 +12,7 @@
 
 #include "common/calendar.h"
 #include "platform/series/netcdf_units.h"
+#include "platform/series/shown_values.h"
 
 namespace mirevo {
 namespace {
@@ -19,7 +21,7 @@ using ::testing::DoubleNear;
 using ::testing::ElementsAre;
 using ::testing::HasSubstr;
 
-/// A file that a test writes by calls of the library.
+/// A file that a test writes by calls of the library; values go into it as it is closed.
 class NetcdfFile final {
  public:
   explicit NetcdfFile(const std::string& name, int mode = NC_NETCDF4)
@@ -31,15 +33,15 @@ class NetcdfFile final {
   NetcdfFile& operator=(const NetcdfFile&) = delete;
 
   const std::string& path() const { return path_; }
-  int id() const { return id_; }
   int dimension(const char* name, std::size_t length) const {
     int dimension = -1;
     check(nc_def_dim(id_, name, length, &dimension));
     return dimension;
   }
-  int variable(const char* name, nc_type type, std::vector<int> dimensions) const {
+  int variable(const char* name, nc_type type, std::vector<int> dimensions, std::vector<double> values = {}) {
     int variable = -1;
     check(nc_def_var(id_, name, type, static_cast<int>(dimensions.size()), dimensions.data(), &variable));
+    values_.emplace_back(variable, std::move(values));
     return variable;
   }
   void text(int variable, const char* name, const std::string& value) const {
@@ -48,44 +50,46 @@ class NetcdfFile final {
   void number(int variable, const char* name, nc_type type, double value) const {
     check(nc_put_att_double(id_, variable, name, type, 1, &value));
   }
-  void values(int variable, const std::vector<double>& values) const {
-    nc_enddef(id_);  // an error where the format needs none
-    check(nc_put_var_double(id_, variable, values.data()));
-  }
-  int time(int dimension, const std::string& units) const {
-    const int variable = this->variable("time", NC_DOUBLE, {dimension});
+  int time(int dimension, const std::string& units, std::vector<double> values) {
+    const int variable = this->variable("time", NC_DOUBLE, {dimension}, std::move(values));
     text(variable, "units", units);
     return variable;
   }
-  void close() const { check(nc_close(id_)); }
+  void close() const {
+    nc_enddef(id_);  // an error where the format needs none
+    for (const auto& [variable, values] : values_) {
+      std::vector<std::size_t> start(3, 0);
+      std::vector<std::size_t> count = shapeOf(variable);
+      if (count[0] == 0) count[0] = values.size() / (count.size() > 1 ? count[1] : 1);  // of no fixed length
+      if (!values.empty()) check(nc_put_vara_double(id_, variable, start.data(), count.data(), values.data()));
+    }
+    check(nc_close(id_));
+  }
   /// Daily values of a variable "flow"; writes and closes the file.
-  void writeFlow(const std::vector<double>& flow) const {
+  void writeFlow(const std::vector<double>& flow) {
     const int days = dimension("time", flow.size());
-    const int axis = time(days, "days since 1990-01-01");
-    const int variable = this->variable("flow", NC_DOUBLE, {days});
     std::vector<double> numbers(flow.size());
     std::iota(numbers.begin(), numbers.end(), 0.0);
-    values(axis, numbers);
-    values(variable, flow);
+    time(days, "days since 1990-01-01", numbers);
+    variable("flow", NC_DOUBLE, {days}, flow);
     close();
   }
 
  private:
+  std::vector<std::size_t> shapeOf(int variable) const {
+    int count = 0;
+    std::array<int, NC_MAX_VAR_DIMS> dimensions{};
+    check(nc_inq_var(id_, variable, nullptr, nullptr, &count, dimensions.data(), nullptr));
+    std::vector<std::size_t> shape(static_cast<std::size_t>(count));
+    for (std::size_t i = 0; i < shape.size(); ++i) check(nc_inq_dimlen(id_, dimensions[i], &shape[i]));
+    return shape;
+  }
   static void check(int status) { ASSERT_EQ(status, NC_NOERR) << nc_strerror(status); }
 
   std::string path_;
   int id_ = -1;
+  std::vector<std::pair<int, std::vector<double>>> values_;
 };
-
-std::vector<float> valuesOf(NetcdfTimeSeries& series, int item) {
-  EXPECT_TRUE(series.getData(item)) << series.lastError();
-  const auto values = series.values(item);
-  std::vector<float> shown(values.begin(), values.end());
-  for (float& value : shown) {
-    if (isMissing(value, series.deleteValue())) value = -999999.0F;
-  }
-  return shown;
-}
 
 TEST(NetcdfTimeSeries, ReadsVariablesStationsAndPacking) {
   for (const int mode : {NC_CLASSIC_MODEL, NC_64BIT_OFFSET, NC_NETCDF4}) {
@@ -94,29 +98,24 @@ TEST(NetcdfTimeSeries, ReadsVariablesStationsAndPacking) {
     const int station = file.dimension("station", 2);
     const int one = file.dimension("level", 1);
     const int two = file.dimension("nv", 2);
-    const int axis = file.time(time, "hours since 2001-01-01 00:00:00.0 UTC");
-    file.text(axis, "bounds", "time_bounds");
+    file.text(file.time(time, "hours since 2001-01-01 00:00:00.0 UTC", {6, 12, 36}), "bounds", "time_bounds");
     file.variable("time_bounds", NC_DOUBLE, {time, two});
     file.variable("label", NC_CHAR, {time, two});
     file.variable("elevation", NC_FLOAT, {station});
     file.variable("grid", NC_FLOAT, {time, station, two});
-    const int flow = file.variable("flow", NC_FLOAT, {time, station});
+    const int flow = file.variable("flow", NC_FLOAT, {time, station}, {1, 10, -1, 20, 3, 30});
     file.number(flow, "_FillValue", NC_FLOAT, -1.0);
-    const int stage = file.variable("stage", NC_SHORT, {station, one, time});
+    const int stage = file.variable("stage", NC_SHORT, {station, one, time}, {2, 4, 7, -32767, 7, 0});
     file.number(stage, "missing_value", NC_SHORT, 7);
     file.number(stage, "scale_factor", NC_DOUBLE, 0.5);
     file.number(stage, "add_offset", NC_DOUBLE, 100.0);
-    const int count = file.variable("count", NC_INT, {time});
-    file.values(axis, {6, 12, 36});
-    file.values(flow, {1, 10, -1, 20, 3, 30});
-    file.values(stage, {2, 4, 7, -32767, 7, 0});
-    file.values(count, {5, 6, 7});
+    file.variable("count", NC_INT, {time}, {5, 6, 7});
     file.close();
 
     NetcdfTimeSeries series;
     ASSERT_TRUE(series.open(file.path())) << series.lastError();
     EXPECT_EQ(formatDate(series.startTime().value()), "2001-01-01 06:00");
-    EXPECT_THAT(std::vector<double>(series.times().begin(), series.times().end()), ElementsAre(0.0, 0.25, 1.25));
+    EXPECT_THAT(timesOf(series), ElementsAre(0.0, 0.25, 1.25));
     ASSERT_EQ(series.itemCount(), 5);
     EXPECT_EQ(series.itemName(2), "flow[2]");
     EXPECT_EQ(series.itemName(5), "count");
@@ -132,29 +131,19 @@ TEST(NetcdfTimeSeries, ReadsVariablesStationsAndPacking) {
 TEST(NetcdfTimeSeries, TakesTheTimeVariableThatIsNamedLikeItsDimension) {
   NetcdfFile file("two_times.nc");
   const int time = file.dimension("time", 2);
-  const int forecast = file.variable("forecast", NC_DOUBLE, {time});
-  file.text(forecast, "units", "days since 1900-01-01");
-  const int axis = file.time(time, "days since 1990-1-1");
-  file.values(forecast, {0, 1});
+  file.text(file.variable("forecast", NC_DOUBLE, {time}, {0, 1}), "units", "days since 1900-01-01");
   // A third of a day and three years in days: the start is a whole second although the number is not.
-  file.values(axis, {1096.0 + 1.0 / 3.0, 1097.5});
+  file.time(time, "days since 1990-1-1", {1096.0 + 1.0 / 3.0, 1097.5});
   file.close();
   NetcdfTimeSeries series;
   ASSERT_TRUE(series.open(file.path())) << series.lastError();
   EXPECT_EQ(formatDate(series.startTime().value()), "1993-01-01 08:00");
-  EXPECT_THAT(std::vector<double>(series.times().begin(), series.times().end()),
-              ElementsAre(0.0, DoubleNear(7.0 / 6.0, 1e-11)));
+  EXPECT_THAT(timesOf(series), ElementsAre(0.0, DoubleNear(7.0 / 6.0, 1e-11)));
   EXPECT_EQ(series.itemCount(), 1);
 }
 
 TEST(NetcdfTimeSeries, RefusesByName) {
-  struct Case {
-    const char* units;
-    const char* calendar;
-    std::vector<double> times;
-    const char* error;
-  };
-  const Case cases[] = {
+  const std::tuple<const char*, const char*, std::vector<double>, const char*> cases[] = {
       {"days since 1990-01-01",
        "noleap",
        {0, 1},
@@ -170,15 +159,14 @@ TEST(NetcdfTimeSeries, RefusesByName) {
       {"days since 1990-01-01", "", {1e300}, "variable \"time\", step 1: expected a time, found 1e+300"},
       {"days", "", {0}, "expected a time variable over one dimension with units like"},
   };
-  for (const Case& c : cases) {
+  for (const auto& [units, calendar, times, error] : cases) {
     NetcdfFile file("refused.nc");
-    const int axis = file.time(file.dimension("time", c.times.size()), c.units);
-    if (*c.calendar != '\0') file.text(axis, "calendar", c.calendar);
-    file.values(axis, c.times);
+    const int axis = file.time(file.dimension("time", times.size()), units, times);
+    if (*calendar != '\0') file.text(axis, "calendar", calendar);
     file.close();
     NetcdfTimeSeries series;
-    EXPECT_FALSE(series.open(file.path())) << c.error;
-    EXPECT_THAT(series.lastError(), HasSubstr(file.path() + ": " + c.error));
+    EXPECT_FALSE(series.open(file.path())) << error;
+    EXPECT_THAT(series.lastError(), HasSubstr(file.path() + ": " + error));
     EXPECT_EQ(series.timeStepCount(), 0);
   }
 }
@@ -197,26 +185,19 @@ TEST(NetcdfTimeSeries, FilesThatAreNoneOrCutOffAreRefused) {
   NetcdfTimeSeries series;
   EXPECT_FALSE(series.open("no_such_folder/q.nc"));
   EXPECT_EQ(series.lastError(), "no_such_folder/q.nc: opening: No such file or directory");
-  std::string content;
-  {
-    NetcdfFile file("cut.nc");
-    file.writeFlow({0, 1, 2, 3});
-    std::ifstream in(file.path(), std::ios::binary);
-    content.assign(std::istreambuf_iterator<char>(in), {});
-  }
-  const std::string path = std::string(::testing::TempDir()) + "/cut_copy.nc";
+  NetcdfFile file("cut.nc");
+  file.writeFlow({0, 1, 2, 3});
   int refused = 0;
-  for (std::size_t length = 0; length < content.size(); length += 97) {
-    std::ofstream(path, std::ios::binary).write(content.data(), static_cast<std::streamsize>(length));
-    if (!series.open(path)) {
+  for (auto length = std::filesystem::file_size(file.path()); length > 97; length -= 97) {
+    std::filesystem::resize_file(file.path(), length - 97);
+    if (!series.open(file.path())) {
       ++refused;
-      EXPECT_THAT(series.lastError(), ::testing::StartsWith(path + ": "));
+      EXPECT_THAT(series.lastError(), ::testing::StartsWith(file.path() + ": "));
     } else if (series.itemCount() > 0) {
       series.getData(1);
     }
   }
   EXPECT_GT(refused, 10);
-  std::remove(path.c_str());
 }
 
 // The library reads zeros beyond the end of a classic file: a run that stopped half-way would count as a good one.
@@ -226,18 +207,11 @@ TEST(NetcdfTimeSeries, AClassicFileThatWasNotWrittenToItsEndIsRefused) {
       for (const bool hasTwo : {false, true}) {
         NetcdfFile file("classic.nc", format);
         const int time = file.dimension("time", timeLength);
-        const int axis = file.time(time, "days since 1990-01-01");
-        std::vector<int> variables{axis};
-        if (hasTwo) variables.push_back(file.variable("level", NC_SHORT, {time}));
-        variables.push_back(file.variable("flow", NC_DOUBLE, {time, file.dimension("station", 2)}));
-        file.number(variables.back(), "scale_factor", NC_DOUBLE, 1.0);
-        nc_enddef(file.id());
-        const std::size_t start[] = {0, 0};
-        const std::size_t count[] = {3, 2};
-        const double values[] = {1, 2, 3, 4, 5, 6};
-        for (const int variable : variables) {
-          ASSERT_EQ(nc_put_vara_double(file.id(), variable, start, count, values), NC_NOERR);
-        }
+        file.time(time, "days since 1990-01-01", {1, 2, 3});
+        if (hasTwo) file.variable("level", NC_SHORT, {time}, {1, 2, 3});
+        const int stations = file.dimension("station", 2);
+        const int flow = file.variable("flow", NC_DOUBLE, {time, stations}, {1, 2, 3, 4, 5, 6});
+        file.number(flow, "scale_factor", NC_DOUBLE, 1.0);
         file.close();
         const auto size = std::filesystem::file_size(file.path());
         NetcdfTimeSeries series;
@@ -256,13 +230,7 @@ TEST(NetcdfTimeSeries, AClassicFileThatWasNotWrittenToItsEndIsRefused) {
 }
 
 TEST(NetcdfUnits, OriginsAndCalendars) {
-  struct Case {
-    const char* units;
-    const char* calendar;
-    double secondsPerUnit;
-    DateRecord origin;
-  };
-  const Case cases[] = {
+  const std::tuple<const char*, const char*, double, DateRecord> cases[] = {
       {"days since 1990-01-01", "", 86400, {1990, 1, 1}},
       {"Hours Since 1990-1-2 3:04:05", "standard", 3600, {1990, 1, 2, 3, 4, 5}},
       {"minutes since 1970-01-01T00:00:00Z", "proleptic_gregorian", 60, {1970, 1, 1}},
@@ -273,11 +241,11 @@ TEST(NetcdfUnits, OriginsAndCalendars) {
       {"days since 1582-10-15", "", 86400, {1582, 10, 15}},
   };
   std::string reason;
-  for (const Case& c : cases) {
-    const auto units = parseTimeUnits(c.units, c.calendar, reason);
-    ASSERT_TRUE(units.has_value()) << c.units << ": " << reason;
-    EXPECT_EQ(units->secondsPerUnit, c.secondsPerUnit) << c.units;
-    EXPECT_EQ(formatDate(dateOfSecond(units->originSecond)), formatDate(c.origin)) << c.units;
+  for (const auto& [text, calendar, secondsPerUnit, origin] : cases) {
+    const auto units = parseTimeUnits(text, calendar, reason);
+    ASSERT_TRUE(units.has_value()) << text << ": " << reason;
+    EXPECT_EQ(units->secondsPerUnit, secondsPerUnit) << text;
+    EXPECT_EQ(formatDate(dateOfSecond(units->originSecond)), formatDate(origin)) << text;
   }
   for (const char* bad : {"", "days", "days since", "days since x", "days since 1990", "days since 1990-13-01",
                           "days since 1990-02-29", "days since 1990-01-01 00:00 +01:00", "days since 1990-01-01 25:00",

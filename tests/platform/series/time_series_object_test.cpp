@@ -2,6 +2,7 @@
 
 #include <cmath>
 #include <limits>
+#include <tuple>
 
 #include <gtest/gtest.h>
 
@@ -20,11 +21,7 @@ MemoryTimeSeries sampleSeries() {
 
 TEST(TimeSeriesObject, ValueAtATimeIsThatOfTheStepOrLinearBetween) {
   constexpr double kQuarterMillisecond = 0.25e-3 / 86400.0;
-  struct Case {
-    double days;
-    std::optional<float> expected;
-  };
-  const Case cases[] = {
+  const std::tuple<double, std::optional<float>> cases[] = {
       {-0.001, std::nullopt},        // before the axis
       {-kQuarterMillisecond, 1.0F},  // the same time
       {0.0, 1.0F},
@@ -44,12 +41,12 @@ TEST(TimeSeriesObject, ValueAtATimeIsThatOfTheStepOrLinearBetween) {
       {std::numeric_limits<double>::quiet_NaN(), std::nullopt},
   };
   const MemoryTimeSeries series = sampleSeries();
-  for (const Case& c : cases) {
-    EXPECT_EQ(valueAt(series, 1, c.days), c.expected) << c.days;
+  for (const auto& [days, expected] : cases) {
+    EXPECT_EQ(valueAt(series, 1, days), expected) << days;
     // Whatever step the search begins at, it ends at the same one.
     for (std::size_t start = 0; start < 9; ++start) {
       std::size_t hint = start;
-      EXPECT_EQ(valueAt(series, 1, c.days, hint), c.expected) << c.days << " from " << start;
+      EXPECT_EQ(valueAt(series, 1, days, hint), expected) << days << " from " << start;
     }
   }
 }
@@ -66,11 +63,7 @@ TEST(TimeSeriesObject, InterpolatesIn64BitsAndRoundsOnce) {
 
 TEST(TimeSeriesObject, ExtremesSkipMissingValuesAndIncludeBothEnds) {
   const MemoryTimeSeries series = sampleSeries();
-  struct Case {
-    double start, end;
-    std::optional<float> smallest, largest;
-  };
-  const Case cases[] = {
+  const std::tuple<double, double, std::optional<float>, std::optional<float>> cases[] = {
       {0.0, 7.0, 0.5F, 8.0F},
       {1.0, 3.0, 3.0F, 4.0F},
       {1.5, 2.5, std::nullopt, std::nullopt},
@@ -78,11 +71,10 @@ TEST(TimeSeriesObject, ExtremesSkipMissingValuesAndIncludeBothEnds) {
       {7.0, 9.0, 0.5F, 0.5F},
       {8.0, 9.0, std::nullopt, std::nullopt},
       {-5.0, 0.0, 1.0F, 1.0F},
-      {3.0, 1.0, std::nullopt, std::nullopt},
-  };
-  for (const Case& c : cases) {
-    EXPECT_EQ(extractMinValue(series, 1, c.start, c.end), c.smallest) << c.start;
-    EXPECT_EQ(extractMaxValue(series, 1, c.start, c.end), c.largest) << c.start;
+      {3.0, 1.0, std::nullopt, std::nullopt}};
+  for (const auto& [start, end, smallest, largest] : cases) {
+    EXPECT_EQ(extractMinValue(series, 1, start, end), smallest) << start;
+    EXPECT_EQ(extractMaxValue(series, 1, start, end), largest) << start;
   }
 }
 

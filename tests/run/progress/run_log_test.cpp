@@ -43,6 +43,21 @@ TEST_F(RunLogTest, RecordsOfAnotherWriterAreNotOverwritten) {
   ::close(copy);
 }
 
+TEST_F(RunLogTest, AFileThatIsRemovedUnderWayComesBackWithAllThatWasInIt) {
+  std::string reason;
+  RunLog log;
+  ASSERT_TRUE(log.open(path_, reason)) << reason;
+  log.line("first");
+  const int descriptor = log.descriptor();  // a signal handler may have it already
+  for (const char* text : {"second", "third"}) {
+    std::filesystem::remove(path_);
+    log.line(text);
+  }
+  EXPECT_EQ(content(), "first\nsecond\nthird\n");
+  EXPECT_EQ(log.descriptor(), descriptor);
+  EXPECT_EQ(log.writeError(), "");
+}
+
 TEST_F(RunLogTest, FailuresOfTheSystemAreReported) {
   std::string reason;
   RunLog log;

@@ -1,6 +1,7 @@
 #include "run/results/restart.h"
 
 #include <cmath>
+#include <functional>
 
 #include <gmock/gmock.h>
 
@@ -51,6 +52,13 @@ TEST_F(RestartSettingsTest, WhatHasChangedIsNamed) {
         "Logical_Operator of MODEL_PARAMETERS/INTERNAL_CONSTRAINTS/CONSTRAINT_1: 1 then, absent now"}},
   };
   for (const auto& row : cases) EXPECT_EQ(changes(then, read(row.edits)), row.changes);
+}
+
+TEST_F(RestartSettingsTest, AKeywordThatAnEarlierVersionDidNotKnowWorkedAsItsDefaultDoes) {
+  const RestartSettings now = restartSettings(read());
+  RestartSettings then = now;
+  EXPECT_GT(std::erase_if(then.settings, std::mem_fn(&ResultSetting::isDefault)), 0U);
+  EXPECT_THAT(changedSettings(then, now), IsEmpty());
 }
 
 TEST_F(RestartSettingsTest, FilesAreHeldAgainstTheirContent) {
