@@ -33,4 +33,11 @@ std::string formatDate(const DateRecord& date) {
   return text;
 }
 
+std::string isoTime(std::int64_t second) {
+  using namespace date_field;
+  const DateRecord date = dateOfSecond(second);
+  return fmt::format("{:04}-{:02}-{:02}T{:02}:{:02}:{:02}", date[kYear], date[kMonth], date[kDay], date[kHour],
+                     date[kMinute], date[kSecond]);
+}
+
 }  // namespace mirevo

@@ -51,4 +51,7 @@ DateRecord dateOfSecond(std::int64_t second);
 /// "2001-01-31 12:30", with ":SS" where the seconds are not 0.
 std::string formatDate(const DateRecord& date);
 
+/// The date of secondNumber() `second` as "1981-10-01T00:00:00".
+std::string isoTime(std::int64_t second);
+
 }  // namespace mirevo

@@ -133,6 +133,30 @@ std::optional<std::string> nearestName(std::string_view name, std::span<const st
   return nearest;
 }
 
+std::size_t utf8Length(std::string_view text) {
+  const auto byte = [text](std::size_t i) { return i < text.size() ? static_cast<unsigned char>(text[i]) : 0U; };
+  const unsigned first = byte(0);
+  const auto continues = [&](std::size_t from, std::size_t to) {
+    for (std::size_t i = from; i < to; ++i) {
+      if ((byte(i) & 0xC0U) != 0x80U) return false;
+    }
+    return true;
+  };
+  if (first < 0x80) return 1;
+  if (first >= 0xC2 && first <= 0xDF) return continues(1, 2) ? 2 : 0;
+  if (first >= 0xE0 && first <= 0xEF) {
+    const bool isOverlong = first == 0xE0 && byte(1) < 0xA0;
+    const bool isSurrogate = first == 0xED && byte(1) > 0x9F;
+    return !isOverlong && !isSurrogate && continues(1, 3) ? 3 : 0;
+  }
+  if (first >= 0xF0 && first <= 0xF4) {
+    const bool isOverlong = first == 0xF0 && byte(1) < 0x90;
+    const bool isPastEnd = first == 0xF4 && byte(1) > 0x8F;
+    return !isOverlong && !isPastEnd && continues(1, 4) ? 4 : 0;
+  }
+  return 0;
+}
+
 std::vector<std::string_view> splitLines(std::string_view text) {
   std::vector<std::string_view> lines;
   while (!text.empty()) {

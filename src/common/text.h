@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <optional>
 #include <span>
@@ -37,6 +38,10 @@ std::string withNumber(std::string_view text, std::int64_t number);
 /// The candidate nearest to `name` (Levenshtein distance, case ignored), for "did you mean"; nothing when none is
 /// closer than a third of the name's length, at least one edit.
 std::optional<std::string> nearestName(std::string_view name, std::span<const std::string> candidates);
+
+/// Bytes of the UTF-8 sequence at the start of `text`; 0 where there is none (RFC 3629: no overlong form, no surrogate,
+/// nothing past U+10FFFF).
+std::size_t utf8Length(std::string_view text);
 
 /// The lines of `text`, without their line ends (LF or CRLF); a last line without an end counts.
 std::vector<std::string_view> splitLines(std::string_view text);

@@ -5,36 +5,12 @@
 
 #include <fmt/format.h>
 
+#include "common/text.h"
+
 namespace mirevo {
 namespace {
 
 constexpr std::string_view kReplacement = "\xEF\xBF\xBD";  // U+FFFD
-
-/// Bytes of the UTF-8 sequence at the start of `text`; 0 where there is none (RFC 3629: no overlong form, no surrogate,
-/// nothing past U+10FFFF).
-std::size_t sequenceLength(std::string_view text) {
-  const auto byte = [text](std::size_t i) { return i < text.size() ? static_cast<unsigned char>(text[i]) : 0U; };
-  const unsigned first = byte(0);
-  const auto continues = [&](std::size_t from, std::size_t to) {
-    for (std::size_t i = from; i < to; ++i) {
-      if ((byte(i) & 0xC0U) != 0x80U) return false;
-    }
-    return true;
-  };
-  if (first < 0x80) return 1;
-  if (first >= 0xC2 && first <= 0xDF) return continues(1, 2) ? 2 : 0;
-  if (first >= 0xE0 && first <= 0xEF) {
-    const bool isOverlong = first == 0xE0 && byte(1) < 0xA0;
-    const bool isSurrogate = first == 0xED && byte(1) > 0x9F;
-    return !isOverlong && !isSurrogate && continues(1, 3) ? 3 : 0;
-  }
-  if (first >= 0xF0 && first <= 0xF4) {
-    const bool isOverlong = first == 0xF0 && byte(1) < 0x90;
-    const bool isPastEnd = first == 0xF4 && byte(1) > 0x8F;
-    return !isOverlong && !isPastEnd && continues(1, 4) ? 4 : 0;
-  }
-  return 0;
-}
 
 void appendEscape(std::string& text, unsigned code) {
   fmt::format_to(std::back_inserter(text), "\\u{:04x}", code);
@@ -53,7 +29,7 @@ JsonWriter& JsonWriter::text(std::string_view value) {
   separate();
   text_ += '"';
   while (!value.empty()) {
-    const std::size_t length = sequenceLength(value);
+    const std::size_t length = utf8Length(value);
     const std::string_view character = value.substr(0, length == 0 ? 1 : length);
     value.remove_prefix(character.size());
     const char c = character.front();

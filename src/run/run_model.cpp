@@ -8,6 +8,7 @@
 
 #include <fmt/format.h>
 
+#include "common/run_files.h"
 #include "common/text.h"
 #include "run/tasks/tasks.h"
 
@@ -22,8 +23,8 @@ ModelDescription describeModel(const RunConfig& config) {
   model.period = config.period;
   model.objectives = config.objectives;
   model.savedFiles = config.savedOutputFiles;
-  model.savedFolder = fmt::format("{}/{}_Saved", config.setupFolder, config.setupName);
-  model.failedFolderPrefix = processFolderPrefix(config) + "_Failed";
+  model.savedFolder = runFilePath(config.setupFolder + "/" + config.setupName, run_files::kSavedFolder);
+  model.failedFolderPrefix = runFilePath(processFolderPrefix(config), run_files::kFailedFolder);
   model.keepSimulatedValues = keepsSimulatedValues(config);
   return model;
 }
@@ -31,7 +32,7 @@ ModelDescription describeModel(const RunConfig& config) {
 LauncherSettings launcherSettings(const RunConfig& config, int slotCount, int firstFolderNumber) {
   LauncherSettings settings;
   settings.baseFolder = config.baseFolder;
-  settings.processFolderPrefix = processFolderPrefix(config) + "_Process";
+  settings.processFolderPrefix = runFilePath(processFolderPrefix(config), run_files::kProcessFolder);
   settings.batchItems = config.batchItems;
   settings.slotCount = slotCount;
   settings.firstFolderNumber = firstFolderNumber;

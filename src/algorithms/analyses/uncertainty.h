@@ -8,6 +8,7 @@
 #include "algorithms/analyses/analysis_settings.h"
 #include "algorithms/numbers/sample_summary.h"
 #include "algorithms/numbers/special_functions.h"
+#include "common/data_table.h"
 #include "common/parameter_set.h"
 #include "evaluation/evaluator.h"
 
@@ -46,6 +47,10 @@ struct UncertaintySummary {
 };
 
 UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome);
+
+/// The same for programs: mean, standard deviation and quantiles of each parameter (search scale), measure and
+/// objective function; the correlation of the parameters of the sample.
+std::vector<DataTable> uncertaintyTables(const UncertaintySummary& summary, const AnalysisNames& names);
 
 /// The summary as lines of text for the log.
 std::vector<std::string> formatUncertainty(const UncertaintySummary& summary, const AnalysisNames& names);

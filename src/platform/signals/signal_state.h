@@ -12,6 +12,7 @@ struct SignalState {
   std::atomic<int> terminationLogUnit{0};  ///< a descriptor; nothing is written there while it is 0 or less
   std::atomic<int> runLogDescriptor{-1};
   std::atomic<int> resultFileDescriptor{-1};   ///< while it takes rows; not yet at its closing lines
+  std::atomic<int> runRecordDescriptor{-1};    ///< while the record of the run has no ending
   std::atomic<int> messageFileDescriptor{-1};  ///< of the progress records
   std::atomic<int> heldSteps{0};               ///< EndingSignalsHeld that exist
   std::atomic<bool> isEnding{false};           ///< a request to end the run was taken
@@ -31,12 +32,6 @@ void writeLineFromSignal(int descriptor, std::string_view text, std::string_view
 
 /// The signals that ask the run to end, rather than tell of its crash.
 inline constexpr std::array kEndingRequests{SIGINT, SIGTERM, SIGHUP, SIGQUIT, SIGXCPU};
-
-inline constexpr std::string_view kInterrupted = "Control-C send";
-inline constexpr std::string_view kTerminationRequest = "Termination request";
-
-/// Whether a run that left this message was asked by a signal to end, rather than crashed.
-bool isEndingRequest(std::string_view message) noexcept;
 
 /// While one exists the requests to end the run wait, so that no file is left in the middle of a step. For the main
 /// thread; they may be nested.

@@ -73,17 +73,17 @@ bool keepsSimulatedValues(const RunConfig& config) {
           config.sensitivity.calculateCovarianceMatrix);
 }
 
-std::string_view resultFileEnding(const RunConfig& config) {
+std::optional<ResultFileNames> resultFileNames(const RunConfig& config) {
   switch (config.simulationOption) {
     case SimulationOption::scenarioRuns:
     case SimulationOption::uncertaintyAnalysis:
-      return ".dat";
+      return run_files::kPlain;
     case SimulationOption::sensitivityAnalysis:
-      return "_Sensitivity.dat";
+      return run_files::kSensitivity;
     case SimulationOption::parameterOptimisation:
-      return "_Optimisation.dat";
+      return run_files::kOptimisation;
   }
-  return {};
+  return std::nullopt;
 }
 
 std::string processFolderPrefix(const RunConfig& config) {

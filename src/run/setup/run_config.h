@@ -1,12 +1,14 @@
 #pragma once
 
 #include <cstdint>
+#include <optional>
 #include <string>
 #include <vector>
 
 #include "algorithms/analyses/analysis_settings.h"
 #include "algorithms/searches/search_settings.h"
 #include "algorithms/surrogate/proposal_selector.h"
+#include "common/run_files.h"
 #include "measures/objective_functions.h"
 #include "measures/output_measure.h"
 #include "parameters/model_parameter.h"
@@ -117,8 +119,8 @@ struct RunConfig {
 /// Whether the task works with simulated values at the observation times, which the results then have to hold.
 bool keepsSimulatedValues(const RunConfig& config);
 
-/// The ending of the task's result file, behind the setup's name; empty for a task without one.
-std::string_view resultFileEnding(const RunConfig& config);
+/// What the files of the task's results are called; nothing for a task without any.
+std::optional<ResultFileNames> resultFileNames(const RunConfig& config);
 
 /// What the names of folders that the run makes for its model runs begin with.
 std::string processFolderPrefix(const RunConfig& config);

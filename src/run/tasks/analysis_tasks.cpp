@@ -2,6 +2,8 @@
 
 #include <algorithm>
 #include <cmath>
+#include <cstdint>
+#include <iterator>
 #include <limits>
 #include <optional>
 #include <span>
@@ -13,11 +15,15 @@
 #include "algorithms/analyses/local_sensitivity.h"
 #include "algorithms/analyses/series_band.h"
 #include "algorithms/analyses/uncertainty.h"
+#include "common/calendar.h"
+#include "common/run_files.h"
 #include "measures/period_series.h"
 #include "run/tasks/band_file.h"
 
 namespace mirevo {
 namespace {
+
+constexpr double kSecondsPerDay = 86400.0;
 
 AnalysisNames analysisNames(const TaskContext& context) {
   AnalysisNames names{context.space.names, {}, {}};
@@ -39,7 +45,7 @@ std::vector<std::string> reportBands(const TaskContext& context, std::span<const
     const SeriesBand band = seriesBand(observed.values, results, first);
     first += observed.values.size();
     const std::string& name = context.config.measures[observed.measure].name;
-    const std::string path = fmt::format("{}_Band_{}.csv", context.filePrefix, observed.measure + 1);
+    const std::string path = runFilePath(context.filePrefix, run_files::kBand, static_cast<int>(observed.measure) + 1);
     writeBandFile(path, name, observed, band);
     lines.push_back(band.observationCount == 0
                         ? fmt::format("Band of {}: no observation has a simulated value", name)
@@ -53,6 +59,7 @@ std::vector<std::string> reportBands(const TaskContext& context, std::span<const
 /// What the covariance is computed from: one entry an observation, and one row of simulated values a set.
 struct ComparedValues {
   std::vector<double> observed;  ///< NaN for an observation that does not count
+  std::vector<ObservationLabel> labels;
   std::vector<double> weights;
   std::vector<std::vector<double>> simulated;  ///< empty for a set that failed
 };
@@ -82,55 +89,67 @@ ComparedValues compareSeries(const TaskContext& context, std::span<const Evaluat
       compared.simulated[i].insert(compared.simulated[i].end(), from,
                                    from + static_cast<std::ptrdiff_t>(series.values.size()));
     }
+    const std::int64_t origin = secondNumber(series.start);
     for (std::size_t t = 0; t < series.values.size(); ++t) {
       const bool isAbove = results.front().ok() && results.front().simulatedValues[begin + t] > series.values[t];
       const double weight = isAbove ? measure.weightAbove : measure.weight;
       compared.observed.push_back(weight == 0.0 ? std::numeric_limits<double>::quiet_NaN() : series.values[t]);
       compared.weights.push_back(weight * weight);
+      compared.labels.push_back({measure.name, isoTime(origin + std::llround(series.days[t] * kSecondsPerDay))});
     }
   }
   return compared;
 }
 
-std::vector<std::string> reportCovariance(const TaskContext& context, const LocalSensitivity& sensitivity) {
+AnalysisFindings findCovariance(const TaskContext& context, const LocalSensitivity& sensitivity) {
   if (!sensitivity.results.front().ok()) {
-    return {"Warning: No covariance matrix: the model run with the initial values failed"};
+    return {{"Warning: No covariance matrix: the model run with the initial values failed"}, {}};
   }
   ComparedValues compared = compareSeries(context, sensitivity.results);
   if (compared.observed.empty()) {
-    return {"Warning: No covariance matrix: no objective function compares time series"};
+    return {{"Warning: No covariance matrix: no objective function compares time series"}, {}};
   }
   const std::optional<LinearisedModel> model =
       linearise(sensitivity.plan, compared.simulated, compared.observed, std::move(compared.weights));
-  if (!model) return {"Warning: No covariance matrix: the model run with the initial values failed"};
-  return formatCovariance(parameterCovariance(*model), context.space, sensitivity.plan.sets.front());
+  if (!model) return {{"Warning: No covariance matrix: the model run with the initial values failed"}, {}};
+  const ParameterCovariance covariance = parameterCovariance(*model);
+  const ParameterSet& set = sensitivity.plan.sets.front();
+  AnalysisFindings findings{formatCovariance(covariance, context.space, set),
+                            covarianceTables(covariance, context.space, set)};
+  findings.tables.push_back(jacobianTable(*model, context.space, compared.labels));
+  return findings;
 }
 
 }  // namespace
 
-std::vector<std::string> runUncertainty(const TaskContext& context) {
+AnalysisFindings runUncertainty(const TaskContext& context) {
   const UncertaintyOutcome outcome =
       uncertaintyAnalysis(context.config.uncertainty, context.config.randomSeed, context.evaluator,
                           [&context](std::string_view text) { context.log.line(text); });
-  std::vector<std::string> report = formatUncertainty(summariseUncertainty(outcome), analysisNames(context));
-  logReport(context, report);
+  const UncertaintySummary summary = summariseUncertainty(outcome);
+  const AnalysisNames names = analysisNames(context);
+  AnalysisFindings findings{formatUncertainty(summary, names), uncertaintyTables(summary, names)};
+  logReport(context, findings.lines);
   const std::vector<std::string> bands = reportBands(context, outcome.results);
   logReport(context, bands);
-  report.emplace_back();
-  report.insert(report.end(), bands.begin(), bands.end());
-  return report;
+  findings.lines.emplace_back();
+  findings.lines.insert(findings.lines.end(), bands.begin(), bands.end());
+  return findings;
 }
 
-std::vector<std::string> runSensitivity(const TaskContext& context) {
+AnalysisFindings runSensitivity(const TaskContext& context) {
   const LocalSensitivity sensitivity =
       localSensitivity(context.config.sensitivity.local, context.space, context.evaluator);
-  std::vector<std::string> report = formatSensitivity(sensitivity, analysisNames(context));
+  const AnalysisNames names = analysisNames(context);
+  AnalysisFindings findings{formatSensitivity(sensitivity, names), sensitivityTables(sensitivity, names)};
   if (context.config.sensitivity.calculateCovarianceMatrix) {
-    report.emplace_back();
-    for (std::string& line : reportCovariance(context, sensitivity)) report.push_back(std::move(line));
+    findings.lines.emplace_back();
+    AnalysisFindings covariance = findCovariance(context, sensitivity);
+    std::move(covariance.lines.begin(), covariance.lines.end(), std::back_inserter(findings.lines));
+    std::move(covariance.tables.begin(), covariance.tables.end(), std::back_inserter(findings.tables));
   }
-  logReport(context, report);
-  return report;
+  logReport(context, findings.lines);
+  return findings;
 }
 
 }  // namespace mirevo

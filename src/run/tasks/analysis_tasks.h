@@ -7,13 +7,18 @@
 
 namespace mirevo {
 
-/// The analyses: each evaluates its sets in one batch, logs what it found, and returns the same lines for the result
-/// file. Both throw FatalError and RunCancelled.
+/// What an analysis found: the lines that it has logged, for the result file, and the same for programs.
+struct AnalysisFindings {
+  std::vector<std::string> lines;
+  std::vector<DataTable> tables;
+};
+
+/// The analyses: each evaluates its sets in one batch and logs what it found. Both throw FatalError and RunCancelled.
 
 /// Uncertainty analysis; also writes the band of every simulated series beside the results.
-std::vector<std::string> runUncertainty(const TaskContext& context);
+AnalysisFindings runUncertainty(const TaskContext& context);
 
 /// Local sensitivity analysis, with the covariance of the parameters where the setup asks for it.
-std::vector<std::string> runSensitivity(const TaskContext& context);
+AnalysisFindings runSensitivity(const TaskContext& context);
 
 }  // namespace mirevo

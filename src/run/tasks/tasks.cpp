@@ -1,5 +1,7 @@
 #include "run/tasks/tasks.h"
 
+#include <utility>
+
 #include <fmt/format.h>
 
 #include "algorithms/numbers/uniform_generator.h"
@@ -65,21 +67,25 @@ std::string runOptimisation(const TaskContext& context) {
   return summary.terminationMessage;
 }
 
+TaskOutcome outcomeOf(AnalysisFindings findings) {
+  return {std::string(kEndOfTask), std::move(findings.lines), std::move(findings.tables)};
+}
+
 }  // namespace
 
 TaskOutcome runTask(const TaskContext& context) {
   switch (context.config.simulationOption) {
     case SimulationOption::scenarioRuns:
-      return {runScenarios(context), {}};
+      return {runScenarios(context), {}, {}};
     case SimulationOption::sensitivityAnalysis:
       if (context.config.sensitivity.sensitivityType != 0) break;
-      return {std::string(kEndOfTask), runSensitivity(context)};
+      return outcomeOf(runSensitivity(context));
     case SimulationOption::parameterOptimisation:
-      return {runOptimisation(context), {}};
+      return {runOptimisation(context), {}, {}};
     case SimulationOption::uncertaintyAnalysis:
-      return {std::string(kEndOfTask), runUncertainty(context)};
+      return outcomeOf(runUncertainty(context));
   }
-  return {std::string(kEndOfTask), {}};
+  return {std::string(kEndOfTask), {}, {}};
 }
 
 std::vector<ParameterSet> scenarioSets(const RunConfig& config) {

@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "algorithms/searches/search_algorithm.h"
+#include "common/data_table.h"
 #include "common/parameter_set.h"
 #include "evaluation/evaluator.h"
 #include "measures/observed_series.h"
@@ -33,6 +34,7 @@ struct TaskContext {
 struct TaskOutcome {
   std::string terminationMessage;
   std::vector<std::string> report;  ///< what it found, for the end of the result file; the log has it already
+  std::vector<DataTable> tables;    ///< the same for programs
 };
 
 /// Runs the task that the setup chooses; one that does not exist runs nothing. Throws FatalError and RunCancelled.
