@@ -4,28 +4,43 @@
 #include <limits>
 
 #include "common/text.h"
+#include "common/utf8.h"
 
 namespace mirevo {
 namespace {
 
+constexpr std::string_view kHexDigits = "0123456789abcdef";
+
+bool hasMeaningToReaders(char c) {
+  return static_cast<unsigned char>(c) < ' ' || c == '\x7F' || c == '#' || c == '"';
+}
+
 std::string escaped(std::string_view text) {
   std::string result;
-  for (const char c : text) {
-    switch (c) {
-      case '\t':
-        result += "\\t";
-        break;
-      case '\n':
-        result += "\\n";
-        break;
-      case '\\':
-        result += "\\\\";
-        break;
-      default:
-        result += static_cast<unsigned char>(c) < ' ' ? ' ' : c;
+  while (!text.empty()) {
+    const Utf8Character first = firstCharacter(text);
+    const char c = text.front();
+    if (c == '\t' || c == '\n' || c == '\\') {
+      result += '\\';
+      result += c == '\t' ? 't' : c == '\n' ? 'n' : c;
+    } else if (!first.isValid || hasMeaningToReaders(c)) {
+      const auto byte = static_cast<unsigned char>(c);
+      result.append("\\x") += kHexDigits[byte / 16U];
+      result += kHexDigits[byte % 16U];
+    } else {
+      result += text.substr(0, first.bytes);
     }
+    text.remove_prefix(first.bytes);
   }
   return result;
+}
+
+/// The sign whose code stands in two hexadecimal digits at the start of `text`.
+std::optional<char> hexSign(std::string_view text) {
+  const std::size_t high = text.size() < 2 ? std::string_view::npos : kHexDigits.find(text[0]);
+  const std::size_t low = high == std::string_view::npos ? high : kHexDigits.find(text[1]);
+  if (low == std::string_view::npos) return std::nullopt;
+  return static_cast<char>(high * 16 + low);
 }
 
 std::string unescaped(std::string_view text) {
@@ -36,9 +51,21 @@ std::string unescaped(std::string_view text) {
       continue;
     }
     const char next = text[++i];
-    result += next == 't' ? '\t' : next == 'n' ? '\n' : next;
+    if (const auto sign = next == 'x' ? hexSign(text.substr(i + 1)) : std::nullopt) {
+      result += *sign;
+      i += 2;
+    } else {
+      result += next == 't' ? '\t' : next == 'n' ? '\n' : next;
+    }
   }
   return result;
+}
+
+/// A head line is for people and needs no more.
+std::string onOneLine(std::string text) {
+  std::replace_if(
+      text.begin(), text.end(), [](char c) { return static_cast<unsigned char>(c) < ' '; }, ' ');
+  return text;
 }
 
 std::string cellText(const DataTable::Cell& cell) {
@@ -69,7 +96,7 @@ std::string dataTableRow(const std::vector<DataTable::Cell>& cells) {
 
 std::string dataTableHead(const DataTable& table) {
   std::string text;
-  for (const std::string& line : table.headLines) text += "# " + escaped(line) + '\n';
+  for (const std::string& line : table.headLines) text += "# " + onOneLine(line) + '\n';
   return text + dataTableRow({table.columns.begin(), table.columns.end()});
 }
 
@@ -93,7 +120,7 @@ ReadTable readDataTable(std::string_view text) {
     if (!line.empty() && line.back() == '\r') line.remove_suffix(1);
     if (line.empty()) continue;
     if (line.front() == '#') {
-      if (table.columns.empty()) table.headLines.push_back(unescaped(trim(line.substr(1))));
+      if (table.columns.empty()) table.headLines.emplace_back(trim(line.substr(1)));
     } else if (table.columns.empty()) {
       table.columns = cellsOf(line);
     } else if (auto cells = cellsOf(line); cells.size() == table.columns.size()) {

@@ -11,8 +11,7 @@
 namespace mirevo {
 
 /// A table for programs to read: what a run found, typed and at full precision. As a file it is tab-separated text
-/// below
-/// `#` lines, which spreadsheets, R and pandas read as it stands.
+/// below `#` lines, which spreadsheets, R and pandas read as it stands.
 struct DataTable {
   using Cell = std::variant<std::int64_t, double, std::string>;
 
@@ -23,8 +22,10 @@ struct DataTable {
 };
 
 /// The table as text: `#` head lines, a header row, one line per row. Reals read back as the same 64 bits ("NaN",
-/// "Inf",
-/// "-Inf" for the others); a tab, a line end or a backslash in a text is written as `\t`, `\n` or `\\`.
+/// "Inf", "-Inf" for the others). In a text a tab, a line end or a backslash is written as `\t`, `\n` or `\\`, and any
+/// other sign that a reader of tables takes for something else as `\x` and two hexadecimal digits: control characters,
+/// `#`, which begins a comment, `"`, which opens a quoted cell, and bytes that are not UTF-8. All of it reads back as
+/// it was.
 std::string dataTableText(const DataTable& table);
 /// One row as dataTableText() has it, line end included.
 std::string dataTableRow(const std::vector<DataTable::Cell>& cells);

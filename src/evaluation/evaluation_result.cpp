@@ -6,28 +6,40 @@
 namespace mirevo {
 namespace {
 
-/// In the order of the kinds. These stand in calSimErr.dat, from which a restarted run reads them.
-constexpr std::array<std::string_view, 10> kKindNames = {"parameter constraints violated",
-                                                         "equation without a finite value",
-                                                         "batch could not be started",
-                                                         "batch ended with an exit code",
-                                                         "batch ended by a signal",
-                                                         "batch ran too long",
-                                                         "results not written",
-                                                         "results not readable",
-                                                         "result not finite",
-                                                         "reason not known any more"};
+struct KindNames {
+  std::string_view key;
+  std::string_view name;
+};
+
+/// In the order of the kinds. Files hold the keys, which never change; the names are for people.
+constexpr std::array<KindNames, 10> kKinds = {{
+    {"constraintsViolated", "parameter constraints violated"},
+    {"equationNotFinite", "equation without a finite value"},
+    {"couldNotStart", "batch could not be started"},
+    {"exitCode", "batch ended with an exit code"},
+    {"signal", "batch ended by a signal"},
+    {"timedOut", "batch ran too long"},
+    {"resultsNotWritten", "results not written"},
+    {"resultsNotReadable", "results not readable"},
+    {"resultNotFinite", "result not finite"},
+    {"notKnown", "reason not known any more"},
+}};
 
 }  // namespace
 
 std::string_view failureKindName(EvaluationFailure::Kind kind) {
-  return kKindNames.at(static_cast<std::size_t>(kind));
+  return kKinds.at(static_cast<std::size_t>(kind)).name;
 }
 
-std::optional<EvaluationFailure::Kind> failureKindCalled(std::string_view name) {
-  const auto found = std::find(kKindNames.begin(), kKindNames.end(), name);
-  if (found == kKindNames.end()) return std::nullopt;
-  return static_cast<EvaluationFailure::Kind>(found - kKindNames.begin());
+std::string_view failureKindKey(EvaluationFailure::Kind kind) {
+  return kKinds.at(static_cast<std::size_t>(kind)).key;
+}
+
+std::optional<EvaluationFailure::Kind> failureKindOfKey(std::string_view key) {
+  const auto found =
+      std::find_if(kKinds.begin(), kKinds.end(), [key](const KindNames& kind) { return kind.key == key; });
+  if (found == kKinds.end()) return std::nullopt;
+  return static_cast<EvaluationFailure::Kind>(found - kKinds.begin());
 }
 
 }  // namespace mirevo

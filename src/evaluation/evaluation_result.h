@@ -37,8 +37,10 @@ struct EvaluationFailure {
 
 /// What a kind of failure is called, "batch ran too long".
 std::string_view failureKindName(EvaluationFailure::Kind kind);
-/// The kind of that name; nothing for another text.
-std::optional<EvaluationFailure::Kind> failureKindCalled(std::string_view name);
+/// What files call it, "timedOut"; the same in every version of the program.
+std::string_view failureKindKey(EvaluationFailure::Kind kind);
+/// The kind of that key; nothing for another text.
+std::optional<EvaluationFailure::Kind> failureKindOfKey(std::string_view key);
 
 /// A measure some of whose observations the model run has no value for; the rest of them is what was judged.
 struct UnusedObservations {

@@ -83,7 +83,7 @@ ModelRunner::ModelRunner(ModelDescription description, ParameterModel& parameter
       aggregator_(aggregator),
       launcher_(launcher),
       processFolderPrefix_(launcherSettings.processFolderPrefix),
-      shownRuns_(parameters.searchSpace().initial) {
+      shownRuns_(ToModelScale(parameters.searchSpace(), parameters.searchSpace().initial)) {
   requireFilesInBaseFolder();
   const std::vector<std::string> converted = readTemplates();
   series_ = SeriesTables::MirevoTSobjectInit(description_.measures, description_.period);
@@ -177,7 +177,7 @@ std::optional<EvaluationFailure> ModelRunner::prepareModelRun(std::span<const do
       updateResistanceNumbers(path);
     }
   }
-  shownRuns_.begin(slot, set);
+  shownRuns_.begin(slot, ToModelScale(parameters_.searchSpace(), set));
   launcher_.createProcesses(slot);
   return std::nullopt;
 }

@@ -1,12 +1,10 @@
 #pragma once
 
-#include <cstdint>
 #include <limits>
 #include <map>
-#include <span>
 #include <utility>
 
-#include "common/parameter_set.h"
+#include "evaluation/chosen_evaluations.h"
 
 namespace mirevo {
 
@@ -15,25 +13,26 @@ namespace mirevo {
 /// its own process is not the best of all.
 class ShownRuns final {
  public:
-  explicit ShownRuns(ParameterSet initialSet) : initialSet_(std::move(initialSet)) {}
+  /// `setupValues`: the initial values of the variable parameters, model scale.
+  explicit ShownRuns(std::vector<double> setupValues) : initial_(std::move(setupValues)) {}
 
-  /// A model run with this set has begun in the slot; runs begin in the order of their evaluations' numbers.
-  void begin(int slot, std::span<const double> set);
+  /// A model run with these values (model scale) has begun in the slot; runs begin in the order of their evaluations'
+  /// numbers.
+  void begin(int slot, std::vector<double> parameterValues);
 
-  /// Whether the slot's run, which has succeeded with this aggregate, may be shown: it has the initial parameters, is
-  /// the earliest that succeeded so far, or is not worse than any before. An aggregate that is not known yet (NaN) may
-  /// come to be the best.
+  /// Whether the slot's run, which has succeeded with this aggregate, may be shown: it is the initial one of those of
+  /// this process so far, or not worse than any before: of equals a search may take any. An aggregate that is not known
+  /// yet (NaN) may come to be the best.
   bool mayBeShown(int slot, double aggregate);
 
  private:
   struct Run {
-    std::int64_t order = 0;
-    bool hasInitialSet = false;
+    int order = 0;
+    std::vector<double> parameterValues;
   };
-  ParameterSet initialSet_;
+  InitialChoice initial_;
   std::map<int, Run> runs_;  ///< by slot
-  std::int64_t begun_ = 0;
-  std::int64_t earliest_ = std::numeric_limits<std::int64_t>::max();  ///< of the runs that succeeded
+  int begun_ = 0;
   double best_ = std::numeric_limits<double>::infinity();
 };
 

@@ -1,8 +1,10 @@
 #pragma once
 
+#include <span>
 #include <string>
-#include <string_view>
 #include <vector>
+
+#include "run/results/failure_table.h"
 
 namespace mirevo {
 
@@ -13,8 +15,8 @@ struct FailureReason {
   std::string example;  ///< the first of them: its number, and the last lines that its batch printed
 };
 
-/// Reads the text of `calSimErr.dat` and groups its evaluations by their reasons, the most frequent first. Reasons that
-/// differ in numbers alone (a slot's folder, a value) are one. Nothing where it holds the failures of another setup.
-std::vector<FailureReason> readFailureReasons(std::string_view text, std::string_view setupName);
+/// Groups failed evaluations by their reasons, the most frequent first. Reasons that differ in numbers alone (a slot's
+/// folder, a value) are one.
+std::vector<FailureReason> groupFailures(std::span<const FailureRow> failures);
 
 }  // namespace mirevo

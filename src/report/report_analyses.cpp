@@ -2,12 +2,16 @@
 
 #include <algorithm>
 #include <cmath>
+#include <limits>
 #include <map>
 
 #include <fmt/format.h>
 
 #include "algorithms/analyses/local_sensitivity.h"
 #include "common/calendar.h"
+#include "common/data_table.h"
+#include "common/files.h"
+#include "common/run_files.h"
 #include "measures/period_series.h"
 #include "platform/series/time_series_object.h"
 
@@ -17,16 +21,13 @@ namespace {
 /// Answers with the results of evaluations that were made before; one that is not there counts as failed.
 class EarlierResults final : public Evaluator {
  public:
-  EarlierResults(const RunConfig& config, const SearchSpace& space, const ResultTable& results) {
-    const auto parameters = static_cast<std::ptrdiff_t>(space.size());
-    const auto measures = static_cast<std::ptrdiff_t>(config.measures.size());
-    for (const ResultTable::Row& row : results.rows) {
+  EarlierResults(const RunConfig& config, std::span<const ResultRow> rows) {
+    for (const ResultRow& row : rows) {
       EvaluationResult& result = results_[row.number];
       result.number = row.number;
-      const auto firstMeasure = row.values.begin() + parameters;
-      result.measureValues.assign(firstMeasure, firstMeasure + measures);
-      result.objectiveValues.assign(firstMeasure + measures, row.values.end() - 1);
-      result.aggregate = row.values.back();
+      result.measureValues = row.measures;
+      result.objectiveValues = row.objectives;
+      result.aggregate = row.aggregate;
       if (!row.ok) result.failure.emplace();
     }
     missing_.measureValues.assign(config.measures.size(), kFailedRunValue);
@@ -84,6 +85,21 @@ std::optional<ReportedBand> readBand(const std::string& path) {
   return band;
 }
 
+/// A table that an analysis has written; an empty one where there is none. Throws FatalError where there is one that
+/// cannot be read.
+ReadTable readTable(const std::string& filePrefix, const RunFile& file) {
+  return readDataTable(readFileIfThere(runFilePath(filePrefix, file)).value_or(""));
+}
+
+/// The numbers in the cells from `first` on; NaN where there is none.
+std::vector<double> numbersOf(const std::vector<std::string>& cells, std::size_t first) {
+  std::vector<double> numbers;
+  for (std::size_t i = first; i < cells.size(); ++i) {
+    numbers.push_back(realCell(cells[i]).value_or(std::numeric_limits<double>::quiet_NaN()));
+  }
+  return numbers;
+}
+
 }  // namespace
 
 std::string pairName(std::span<const OutputMeasure> measures, std::size_t measure) {
@@ -98,7 +114,7 @@ std::string pairName(std::span<const OutputMeasure> measures, std::size_t measur
 std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::string& filePrefix) {
   std::vector<ReportedBand> bands;
   for (const std::size_t i : measuresOfDistinctPairs(config.measures)) {
-    auto band = readBand(fmt::format("{}_Band_{}.csv", filePrefix, i + 1));
+    auto band = readBand(runFilePath(filePrefix, run_files::kBand, static_cast<int>(i) + 1));
     if (!band) continue;
     band->measure = pairName(config.measures, i);
     bands.push_back(std::move(*band));
@@ -107,10 +123,10 @@ std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::stri
 }
 
 std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, const SensitivitySettings& settings,
-                                                       const SearchSpace& space, const ResultTable& results) {
-  const auto isBase = [](const ResultTable::Row& row) { return row.number == 1 && row.ok; };
-  if (std::none_of(results.rows.begin(), results.rows.end(), isBase)) return std::nullopt;
-  EarlierResults evaluator(config, space, results);
+                                                       const SearchSpace& space, std::span<const ResultRow> rows) {
+  const auto isBase = [](const ResultRow& row) { return row.number == 1 && row.ok; };
+  if (std::none_of(rows.begin(), rows.end(), isBase)) return std::nullopt;
+  EarlierResults evaluator(config, rows);
   const LocalSensitivity found = localSensitivity(settings, space, evaluator);
   ReportedSensitivity reported;
   reported.parameters = space.names;
@@ -122,8 +138,31 @@ std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, 
   }
   reported.composite = config.objectives.empty() ? found.measures.composite : found.objectives.composite;
   for (const std::size_t i : found.ranking) reported.ranking.push_back(space.names[i]);
-  reported.covariance = findCovariance(results.closingLines, space.names);
   return reported;
+}
+
+std::optional<ReportedCovariance> reportedCovariance(const std::string& filePrefix) {
+  const ReadTable limits = readTable(filePrefix, run_files::kParameterLimits);
+  const ReadTable correlation = readTable(filePrefix, run_files::kCorrelation);
+  const auto leftOut = limits.column("LeftOut");
+  constexpr std::size_t kNumbers = 4;  // behind the name
+  if (!leftOut || *leftOut <= kNumbers) return std::nullopt;
+  ReportedCovariance found;
+  for (const std::vector<std::string>& cells : limits.rows) {
+    if (!cells[*leftOut].empty()) {
+      found.leftOut.push_back(cells.front());
+      continue;
+    }
+    const std::vector<double> numbers = numbersOf(cells, 1);
+    found.names.push_back(cells.front());
+    found.estimate.push_back(numbers[0]);
+    found.standardDeviation.push_back(numbers[1]);
+    found.lower95.push_back(numbers[2]);
+    found.upper95.push_back(numbers[3]);
+  }
+  for (const std::vector<std::string>& cells : correlation.rows) found.correlation.push_back(numbersOf(cells, 1));
+  if (found.correlation.size() != found.names.size()) return std::nullopt;
+  return found;
 }
 
 }  // namespace mirevo

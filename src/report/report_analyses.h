@@ -9,7 +9,7 @@
 #include "algorithms/analyses/local_sensitivity.h"
 #include "parameters/search_space.h"
 #include "report/report_data.h"
-#include "run/results/result_table.h"
+#include "run/results/result_row.h"
 #include "run/setup/run_config.h"
 
 namespace mirevo {
@@ -24,6 +24,10 @@ std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::stri
 /// What a local sensitivity analysis found, computed again from its rows; nothing while the run with the initial values
 /// is not there.
 std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, const SensitivitySettings& settings,
-                                                       const SearchSpace& space, const ResultTable& results);
+                                                       const SearchSpace& space, std::span<const ResultRow> rows);
+
+/// The covariance of the parameters that a finished sensitivity analysis has written beside its results; nothing where
+/// there is none.
+std::optional<ReportedCovariance> reportedCovariance(const std::string& filePrefix);
 
 }  // namespace mirevo

@@ -7,15 +7,13 @@
 #include <string>
 #include <vector>
 
-#include "report/covariance_lines.h"
 #include "report/failure_reasons.h"
+#include "run/results/run_record.h"
 #include "run/results/series_table.h"
 
 namespace mirevo {
 
 /// What a report shows. Numbers that are unknown are NaN; texts may hold anything.
-
-enum class RunStateShown { finished, running, cutOff, cancelled, failed };
 
 struct ReportedRun {
   std::string title;
@@ -26,7 +24,7 @@ struct ReportedRun {
   std::string started;
   std::string ended;  ///< empty while it runs
   std::string reportMade;
-  RunStateShown state = RunStateShown::finished;
+  RunStage stage = RunStage::finished;
   std::string message;  ///< why it stopped; may be empty
   int planned = 0;      ///< evaluations; 0: unknown
   std::string aggregation;
@@ -90,6 +88,17 @@ struct ReportedBand {
   std::size_t insideCount = 0;       ///< those of them in the band
 };
 
+/// The parameter covariance of a sensitivity analysis on the model scale, one entry per parameter that has a variance.
+struct ReportedCovariance {
+  std::vector<std::string> names;
+  std::vector<double> estimate;
+  std::vector<double> standardDeviation;
+  std::vector<double> lower95;
+  std::vector<double> upper95;
+  std::vector<std::vector<double>> correlation;
+  std::vector<std::string> leftOut;  ///< parameters without a variance
+};
+
 struct ReportedSensitivity {
   std::vector<std::string> parameters;
   std::vector<std::string> outputs;  ///< output measures, then objective functions
@@ -97,7 +106,7 @@ struct ReportedSensitivity {
   std::vector<std::vector<double>> dimensionless;
   std::vector<double> composite;
   std::vector<std::string> ranking;
-  std::optional<CovarianceReport> covariance;
+  std::optional<ReportedCovariance> covariance;
 };
 
 struct ReportData {

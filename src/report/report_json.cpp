@@ -15,22 +15,6 @@ using Digits = JsonWriter::Digits;
 constexpr int kFormat = 1;
 constexpr std::int64_t kMilliseconds = 1000;
 
-std::string_view stateName(RunStateShown state) {
-  switch (state) {
-    case RunStateShown::finished:
-      return "finished";
-    case RunStateShown::running:
-      return "running";
-    case RunStateShown::cutOff:
-      return "cut off";
-    case RunStateShown::cancelled:
-      return "cancelled";
-    case RunStateShown::failed:
-      return "failed";
-  }
-  return {};
-}
-
 /// Milliseconds since 1970.
 std::int64_t epochMilliseconds(std::int64_t second) {
   constexpr std::int64_t kEpoch = dayNumber(1970, 1, 1) * 86400;
@@ -61,7 +45,7 @@ void writeRun(JsonWriter& json, const ReportData& data) {
   json.member("title", run.title).member("setup", run.setupFile).member("setupName", run.setupName);
   json.member("task", run.task).member("taskName", run.taskName);
   json.optionalMember("started", run.started).optionalMember("ended", run.ended).member("reportMade", run.reportMade);
-  json.member("state", stateName(run.state)).optionalMember("message", run.message);
+  json.member("state", runStageKey(run.stage)).optionalMember("message", run.message);
   json.member("evaluations", data.evaluations.numbers.size());
   json.key("planned");
   if (run.planned > 0) {
@@ -203,7 +187,7 @@ void writeSensitivity(JsonWriter& json, const ReportedSensitivity& sensitivity) 
   json.key("composite").numbers(sensitivity.composite, Digits::drawn).member("ranking", sensitivity.ranking);
   json.key("covariance");
   if (sensitivity.covariance) {
-    const CovarianceReport& covariance = *sensitivity.covariance;
+    const ReportedCovariance& covariance = *sensitivity.covariance;
     json.beginObject().member("names", covariance.names);
     json.key("estimate").numbers(covariance.estimate, Digits::table);
     json.key("standardDeviation").numbers(covariance.standardDeviation, Digits::table);

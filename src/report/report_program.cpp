@@ -6,6 +6,7 @@
 #include <fmt/format.h>
 
 #include "common/fatal_error.h"
+#include "common/run_files.h"
 #include "common/version.h"
 #include "platform/terminal/front_end.h"
 #include "report/run_report.h"
@@ -29,11 +30,11 @@ int makeReport(const std::string& setupFileName) {
   const RunConfig config = readSetupFile(setupFileName, unread);
   const std::string filePrefix = config.setupFolder + "/" + config.setupName;
   std::string reason;
-  if (!writeReport(config, filePrefix, std::nullopt, reason)) {
+  if (!writeReport(config, filePrefix, reason)) {
     showMessage("Error: Unable to write the report of " + setupFileName + "\n" + reason);
     return 1;
   }
-  fmt::print("{}\n", reportPath(filePrefix));
+  fmt::print("{}\n", runFilePath(filePrefix, run_files::kReport));
   return 0;
 }
 

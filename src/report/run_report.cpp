@@ -4,9 +4,9 @@
 #include <cmath>
 #include <exception>
 #include <filesystem>
-#include <sys/stat.h>
+#include <limits>
 #include <utility>
-#include <variant>
+#include <vector>
 
 #include <fmt/format.h>
 
@@ -14,17 +14,16 @@
 #include "common/clock.h"
 #include "common/fatal_error.h"
 #include "common/files.h"
-#include "common/text.h"
+#include "common/run_files.h"
 #include "common/version.h"
+#include "evaluation/chosen_evaluations.h"
 #include "measures/period_series.h"
 #include "parameters/parameter_model.h"
-#include "platform/signals/signal_state.h"
 #include "report/page/page_template.h"
 #include "report/report_analyses.h"
 #include "report/report_file.h"
-#include "run/results/result_file.h"
-#include "run/results/result_table.h"
-#include "run/results/run_lock.h"
+#include "report/report_parameters.h"
+#include "report/run_sources.h"
 #include "run/setup/setup_summary.h"
 
 namespace mirevo {
@@ -32,18 +31,9 @@ namespace {
 
 constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
 
-/// Local time at which the file was last written; empty where there is none.
-std::string timeOfFile(const std::string& path) {
-  struct stat status {};
-  return ::stat(path.c_str(), &status) == 0 ? dateAndTimeOf(status.st_mtime) : std::string{};
-}
-
-/// What stands behind `label` in the first line that begins with it.
-std::string valueOf(std::span<const std::string> lines, std::string_view label) {
-  for (const std::string& line : lines) {
-    if (line.starts_with(label)) return line.substr(label.size());
-  }
-  return {};
+/// A value of an evaluation; NaN where there is no such evaluation.
+double valueOf(const ResultRow* row, std::vector<double> ResultRow::*values, std::size_t i) {
+  return row == nullptr ? kNaN : (row->*values)[i];
 }
 
 /// Puts a report together, part by part; later parts use earlier ones.
@@ -53,97 +43,60 @@ class ReportBuilder final {
       : config_(config), filePrefix_(filePrefix), parameters_(config.parameters, config.constraints) {}
 
   bool readResults(std::string& reason);
-  ReportData build(const std::optional<RunEnding>& ending);
+  ReportData build();
 
  private:
-  using Row = ResultTable::Row;
-
-  bool hasColumnsOfSetup() const;
   void addRun();
-  void addEnding(const std::optional<RunEnding>& ending);
   void addEvaluations();
   void findBestAndInitial();
-  void addParameters();
   void addMeasures();
   void addFailures();
   void addSeries();
+  void addAnalyses();
   void note(std::string sentence) { data_.run.notes.push_back(std::move(sentence)); }
 
-  const Row* rowOf(int number) const;
+  const ResultRow* rowOf(int number) const;
   const SearchSpace& space() const { return parameters_.searchSpace(); }
-  /// All parameters on the model scale for values of the variable ones; NaN where they cannot be had.
-  std::vector<double> allParameters(std::span<const double> variable);
-  double measureOf(const Row* row, std::size_t i) const;
-  double objectiveOf(const Row* row, std::size_t i) const;
 
   const RunConfig& config_;
   const std::string& filePrefix_;
   ParameterModel parameters_;
-  std::string resultPath_;
-  ResultTable table_;
-  const Row* best_ = nullptr;
-  const Row* initial_ = nullptr;
+  RunSources sources_;
+  const ResultRow* best_ = nullptr;
+  const ResultRow* initial_ = nullptr;
   ReportData data_;
 };
 
 bool ReportBuilder::readResults(std::string& reason) {
-  const std::string_view ending = config_.resultFileEnding();
-  if (ending.empty()) {
-    reason = "the setup names no task that has results";
-    return false;
-  }
-  resultPath_ = filePrefix_ + std::string(ending);
-  const auto text = readTextFile(resultPath_, reason);
-  if (!text) {
-    reason = resultPath_ + ": " + reason;
-    return false;
-  }
-  table_ = readResultTable(*text);
-  std::stable_sort(table_.rows.begin(), table_.rows.end(),
-                   [](const Row& a, const Row& b) { return a.number < b.number; });
+  auto sources = readRunSources(config_, space(), filePrefix_, reason);
+  if (!sources) return false;
+  sources_ = *std::move(sources);
   return true;
 }
 
-ReportData ReportBuilder::build(const std::optional<RunEnding>& ending) {
+ReportData ReportBuilder::build() {
+  const ResultTable& table = sources_.results;
   data_.program = fmt::format("Mirevo {}", programVersion());
-  data_.summary = table_.closingLines;
+  data_.summary = table.closingLines;
   data_.periodFirst = secondNumber(config_.period.start);
   data_.periodLast = secondNumber(config_.period.end);
   addRun();
-  addEnding(ending);
-  if (table_.unusableLines > 0 && data_.run.state != RunStateShown::running) {
-    const bool isOne = table_.unusableLines == 1;
+  if (table.unusableLines > 0 && sources_.stage != RunStage::running) {
+    const bool isOne = table.unusableLines == 1;
     note(fmt::format("{} of the result file {} cut off or damaged and left out.",
-                     isOne ? "1 line" : fmt::format("{} lines", table_.unusableLines), isOne ? "is" : "are"));
+                     isOne ? "1 line" : fmt::format("{} lines", table.unusableLines), isOne ? "is" : "are"));
   }
-  if (!hasColumnsOfSetup()) {
-    if (table_.hasHeader()) note("The results are left out: they have other columns than the setup as it is now.");
-    table_.rows.clear();
+  if (table.hasHeader && !table.hasExpectedColumns) {
+    note("The results are left out: they have other columns than the setup as it is now.");
   }
   addEvaluations();
   findBestAndInitial();
-  addParameters();
+  data_.parameters = reportedParameters(config_, parameters_, best_);
   addMeasures();
   addFailures();
   addSeries();
-  const bool isFinished = data_.run.state == RunStateShown::finished;
-  if (!config_.task) return std::move(data_);
-  const TaskReport task = config_.task->report();
-  if (task.hasBands && isFinished) data_.bands = reportedBands(config_, filePrefix_);
-  if (task.sensitivity != nullptr) {
-    data_.sensitivity = reportedSensitivity(config_, *task.sensitivity, space(), table_);
-  }
+  addAnalyses();
   return std::move(data_);
-}
-
-bool ReportBuilder::hasColumnsOfSetup() const {
-  std::vector<std::string> expected;
-  for (const std::string& name : space().names) expected.push_back(columnName(name));
-  for (const OutputMeasure& measure : config_.measures) expected.push_back(columnName(measure.name));
-  for (const ObjectiveFunction& objective : config_.objectives) expected.push_back(columnName(objective.name));
-  expected.emplace_back("Aggregate");
-  return std::equal(expected.begin(), expected.end(), table_.columns.begin(), table_.columns.end(),
-                    [](const std::string& a, const std::string& b) { return trim(a) == trim(b); });
 }
 
 void ReportBuilder::addRun() {
@@ -152,7 +105,10 @@ void ReportBuilder::addRun() {
   run.setupFile = std::filesystem::path(config_.setupFile).filename().string();
   run.setupName = config_.setupName;
   run.taskName = config_.taskDescription();
-  run.started = valueOf(table_.headLines, "Started: ");
+  run.started = sources_.record.started;
+  run.ended = sources_.ended;
+  run.stage = sources_.stage;
+  run.message = sources_.record.message;
   run.reportMade = dateAndTimeNow();
   run.planned = config_.plannedModelRuns();  // the final model run with the best set has a number, too
   run.aggregation = config_.aggregationMethod == AggregationMethod::zero
@@ -169,175 +125,80 @@ void ReportBuilder::addRun() {
   run.surrogate = task.surrogate;
 }
 
-void ReportBuilder::addEnding(const std::optional<RunEnding>& ending) {
-  ReportedRun& run = data_.run;
-  if (ending) {
-    run.state = ending->state;
-    run.message = ending->message;
-    run.ended = dateAndTimeNow();
-    return;
-  }
-  if (table_.closingLines.empty()) {
-    const bool isRunning = RunLock::isHeld(config_.setupFile);
-    run.state = isRunning ? RunStateShown::running : RunStateShown::cutOff;
-    if (!isRunning) run.ended = timeOfFile(resultPath_);
-    return;
-  }
-  run.message = table_.closingLines.front();
-  run.ended = valueOf(table_.closingLines, "Ended: ");
-  if (run.ended.empty()) run.ended = timeOfFile(resultPath_);  // a signal leaves its message alone
-  const std::string message = toLowerAscii(run.message);
-  if (message.ends_with("simulation cancelled")) {
-    run.state = RunStateShown::cancelled;
-  } else if (isEndingRequest(run.message)) {
-    run.state = RunStateShown::cutOff;
-  } else {
-    const bool isEnd = message.starts_with("normal termination") || message.starts_with("optimisation terminated");
-    run.state = isEnd ? RunStateShown::finished : RunStateShown::failed;
-  }
-}
-
 void ReportBuilder::addEvaluations() {
   ReportedEvaluations& evaluations = data_.evaluations;
   evaluations.parameters.resize(space().size());
   evaluations.measures.resize(config_.measures.size());
   evaluations.objectives.resize(config_.objectives.size());
-  for (const Row& row : table_.rows) {
+  for (const ResultRow& row : sources_.results.rows) {
     evaluations.numbers.push_back(row.number);
     evaluations.ok.push_back(row.ok);
-    auto value = row.values.begin();
-    for (auto& column : evaluations.parameters) column.push_back(*value++);
-    for (auto* columns : {&evaluations.measures, &evaluations.objectives}) {
-      for (auto& column : *columns) column.push_back(row.ok ? *value : kNaN), ++value;
-    }
-    evaluations.aggregate.push_back(row.ok ? *value : kNaN);
+    const auto addTo = [](std::vector<std::vector<double>>& columns, const std::vector<double>& values, bool isKnown) {
+      for (std::size_t i = 0; i < columns.size(); ++i) columns[i].push_back(isKnown ? values[i] : kNaN);
+    };
+    addTo(evaluations.parameters, row.parameters, true);
+    addTo(evaluations.measures, row.measures, row.ok);
+    addTo(evaluations.objectives, row.objectives, row.ok);
+    evaluations.aggregate.push_back(row.ok ? row.aggregate : kNaN);
   }
 }
 
 void ReportBuilder::findBestAndInitial() {
-  const std::vector<double> setupValues = ToModelScale(space(), space().initial);
-  bool hasSetupValues = false;
-  for (const Row& row : table_.rows) {
+  BestChoice best;
+  InitialChoice initial(ToModelScale(space(), space().initial));
+  for (const ResultRow& row : sources_.results.rows) {
     if (!row.ok) continue;
-    const double aggregate = row.values.back();
-    if (!std::isnan(aggregate) && (best_ == nullptr || aggregate < best_->values.back())) best_ = &row;
-    const bool isOfSetup = std::equal(setupValues.begin(), setupValues.end(), row.values.begin());
-    if (initial_ == nullptr || (isOfSetup && !hasSetupValues)) initial_ = &row;
-    hasSetupValues = hasSetupValues || isOfSetup;
+    best.consider(row.number, row.aggregate, row.parameters);
+    initial.consider(row.number, row.parameters);
   }
+  if (best.best()) best_ = rowOf(best.best()->number);
+  if (initial.number()) initial_ = rowOf(*initial.number());
   // The search knows which of equally good ones it took.
-  if (const auto number = parseInteger(valueOf(table_.closingLines, "Best evaluation: "))) {
-    if (const Row* row = rowOf(*number)) best_ = row;
+  if (const auto& recorded = sources_.record.best) {
+    if (const ResultRow* row = rowOf(recorded->number)) best_ = row;
   }
-  if (best_ != nullptr) data_.best = ShownEvaluation{best_->number, best_->values.back()};
-  if (initial_ != nullptr) data_.initialNumber = initial_->number;
-  data_.isOfInitialParameters = hasSetupValues;
+  if (best_ != nullptr) data_.best = ShownEvaluation{best_->number, best_->aggregate};
+  data_.initialNumber = initial.number();
+  data_.isOfInitialParameters = initial.hasSetupValues();
 }
 
-const ResultTable::Row* ReportBuilder::rowOf(int number) const {
-  const auto row = std::find_if(table_.rows.begin(), table_.rows.end(),
-                                [number](const Row& candidate) { return candidate.number == number; });
-  return row == table_.rows.end() ? nullptr : &*row;
-}
-
-std::vector<double> ReportBuilder::allParameters(std::span<const double> variable) {
-  ParameterSet set;
-  std::size_t next = 0;
-  bool failed = false;
-  for (const ModelParameter& parameter : config_.parameters) {
-    if (parameter.parameterType != ParameterType::variable) continue;
-    set.push_back(TransformParameterValue(variable[next++], parameter.lowerBound, parameter.transformationType,
-                                          TransformDirection::forward, failed));
-  }
-  const auto mapped = parameters_.MapToModelValues(set);
-  const auto* values = std::get_if<std::span<const double>>(&mapped);
-  std::vector<double> all(config_.parameters.size(), kNaN);
-  if (values != nullptr && !failed) all.assign(values->begin(), values->end());
-  next = 0;
-  for (std::size_t i = 0; i < all.size(); ++i) {  // exactly, where the transformation rounds
-    if (config_.parameters[i].parameterType == ParameterType::variable) all[i] = variable[next++];
-  }
-  return all;
-}
-
-/// Whether a value lies within a hundredth of the range of a bound, on the scale on which the parameter is searched.
-std::string nearBound(const ModelParameter& parameter, double value) {
-  constexpr double kNear = 0.01;
-  const bool isLogarithmic = parameter.transformationType == TransformationType::logarithmic;
-  const auto onScale = [isLogarithmic](double x) { return isLogarithmic ? std::log(x) : x; };
-  const double lower = onScale(parameter.lowerBound);
-  const double upper = onScale(parameter.upperBound);
-  const double reach = kNear * (upper - lower);
-  if (parameter.parameterType != ParameterType::variable || !(reach > 0.0)) return {};
-  if (onScale(value) <= lower + reach) return "lower";
-  return onScale(value) >= upper - reach ? "upper" : "";
-}
-
-void ReportBuilder::addParameters() {
-  const std::vector<double> start = allParameters(ToModelScale(space(), space().initial));
-  std::vector<double> best(config_.parameters.size(), kNaN);
-  if (best_ != nullptr) best = allParameters(std::span(best_->values).first(space().size()));
-  for (std::size_t i = 0; i < config_.parameters.size(); ++i) {
-    const ModelParameter& parameter = config_.parameters[i];
-    ReportedParameter& reported = data_.parameters.emplace_back();
-    reported.name = parameter.name;
-    reported.comment = parameter.comment;
-    const bool isDependent = parameter.parameterType == ParameterType::dependent;
-    if (isDependent) reported.equation = parameter.equation;
-    const bool isVariable = parameter.parameterType == ParameterType::variable;
-    reported.kind = isVariable ? "variable" : isDependent ? "dependent" : "fixed";
-    const bool isLogarithmic = parameter.transformationType == TransformationType::logarithmic;
-    reported.transformation = isLogarithmic ? "logarithmic" : "none";
-    reported.isInteger = parameter.transformationType == TransformationType::integer;
-    reported.lower = isDependent ? kNaN : parameter.lowerBound;
-    reported.upper = isDependent ? kNaN : parameter.upperBound;
-    reported.start = isDependent ? start[i] : parameter.initialValue;
-    reported.best = best[i];
-    reported.nearBound = nearBound(parameter, best[i]);
-  }
-}
-
-double ReportBuilder::measureOf(const Row* row, std::size_t i) const {
-  return row == nullptr ? kNaN : row->values[space().size() + i];
-}
-
-double ReportBuilder::objectiveOf(const Row* row, std::size_t i) const {
-  return row == nullptr ? kNaN : row->values[space().size() + config_.measures.size() + i];
+const ResultRow* ReportBuilder::rowOf(int number) const {
+  const std::vector<ResultRow>& rows = sources_.results.rows;
+  const auto row = std::find_if(rows.begin(), rows.end(),
+                                [number](const ResultRow& candidate) { return candidate.number == number; });
+  return row == rows.end() ? nullptr : &*row;
 }
 
 void ReportBuilder::addMeasures() {
   for (std::size_t i = 0; i < config_.measures.size(); ++i) {
     const OutputMeasure& measure = config_.measures[i];
     data_.measures.push_back({measure.name, std::string(statisticName(measure)), measure.weight, measure.functionName,
-                              measureOf(initial_, i), measureOf(best_, i)});
+                              valueOf(initial_, &ResultRow::measures, i), valueOf(best_, &ResultRow::measures, i)});
   }
   for (std::size_t i = 0; i < config_.objectives.size(); ++i) {
-    data_.objectives.push_back({config_.objectives[i].name, objectiveOf(initial_, i), objectiveOf(best_, i)});
+    data_.objectives.push_back({config_.objectives[i].name, valueOf(initial_, &ResultRow::objectives, i),
+                                valueOf(best_, &ResultRow::objectives, i)});
   }
 }
 
 void ReportBuilder::addFailures() {
   if (std::count(data_.evaluations.ok.begin(), data_.evaluations.ok.end(), false) == 0) return;
-  const std::string path = std::filesystem::path(filePrefix_).replace_filename("calSimErr.dat").string();
-  std::string reason;
-  const auto text = readTextFile(path, reason);
-  if (text) data_.failures = readFailureReasons(*text, config_.setupName);
+  const OptionalSource<std::vector<FailureRow>> source = readFailures(filePrefix_);
+  if (source.content) data_.failures = groupFailures(*source.content);
   if (!data_.failures.empty()) return;
-  note(fmt::format("Why evaluations failed is not shown: calSimErr.dat: {}.",
-                   text ? "it holds no failures of this run" : reason));
+  note(fmt::format("Why evaluations failed is not shown: {}: {}.", source.file,
+                   source.content ? "it holds no failures of this run" : source.reason));
 }
 
 void ReportBuilder::addSeries() {
   const std::vector<std::size_t> shown = measuresOfDistinctPairs(config_.measures);
   if (shown.empty() || initial_ == nullptr) return;
-  const std::string path = filePrefix_ + "_Series.dat";
-  std::string reason;
-  const auto text = readTextFile(path, reason);
-  if (!text) {
-    note(fmt::format("Hydrographs are not shown: {}_Series.dat: {}.", config_.setupName, reason));
+  OptionalSource<SeriesTable> source = readSeries(filePrefix_);
+  if (!source.content) {
+    note(fmt::format("Hydrographs are not shown: {}: {}.", source.file, source.reason));
     return;
   }
-  data_.series = readSeriesTable(*text);
+  data_.series = *std::move(source.content);
   const std::vector<std::string> names = seriesNames(config_.measures, shown);
   std::vector<ShownSeries> series;
   for (std::size_t i = 0; i < shown.size(); ++i) {
@@ -358,25 +219,29 @@ void ReportBuilder::addSeries() {
   }
 }
 
+void ReportBuilder::addAnalyses() {
+  if (!config_.task) return;
+  const bool isFinished = sources_.stage == RunStage::finished;
+  const TaskReport task = config_.task->report();
+  if (task.hasBands && isFinished) data_.bands = reportedBands(config_, filePrefix_);
+  if (task.sensitivity == nullptr) return;
+  data_.sensitivity = reportedSensitivity(config_, *task.sensitivity, space(), sources_.results.rows);
+  if (data_.sensitivity && isFinished) data_.sensitivity->covariance = reportedCovariance(filePrefix_);
+}
+
 }  // namespace
 
-std::string reportPath(const std::string& filePrefix) {
-  return filePrefix + "_Report.html";
-}
-
-std::optional<ReportData> buildReport(const RunConfig& config, const std::string& filePrefix,
-                                      const std::optional<RunEnding>& ending, std::string& reason) {
+std::optional<ReportData> buildReport(const RunConfig& config, const std::string& filePrefix, std::string& reason) {
   ReportBuilder builder(config, filePrefix);
   if (!builder.readResults(reason)) return std::nullopt;
-  return builder.build(ending);
+  return builder.build();
 }
 
-bool writeReport(const RunConfig& config, const std::string& filePrefix, const std::optional<RunEnding>& ending,
-                 std::string& reason) noexcept {
+bool writeReport(const RunConfig& config, const std::string& filePrefix, std::string& reason) noexcept {
   try {
-    const std::optional<ReportData> data = buildReport(config, filePrefix, ending, reason);
+    const std::optional<ReportData> data = buildReport(config, filePrefix, reason);
     if (!data) return false;
-    const std::string path = reportPath(filePrefix);
+    const std::string path = runFilePath(filePrefix, run_files::kReport);
     if (replaceFile(path, reportPage(reportPageTemplate(), *data), reason)) return true;
     reason = path + ": " + reason;
   } catch (const FatalError& error) {
@@ -385,16 +250,6 @@ bool writeReport(const RunConfig& config, const std::string& filePrefix, const s
     reason = error.what();
   }
   return false;
-}
-
-std::vector<std::string> seriesNames(std::span<const OutputMeasure> measures, std::span<const std::size_t> shown) {
-  std::vector<std::string> names;
-  for (const std::size_t i : shown) {
-    std::string name = columnName(measures[i].name);
-    if (std::count(names.begin(), names.end(), name) > 0) name += fmt::format(" (measure {})", i + 1);
-    names.push_back(std::move(name));
-  }
-  return names;
 }
 
 }  // namespace mirevo

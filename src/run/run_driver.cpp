@@ -11,6 +11,7 @@
 #include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/progress_messages.h"
+#include "common/run_files.h"
 #include "common/text.h"
 #include "common/version.h"
 #include "evaluation/local_evaluator.h"
@@ -105,7 +106,7 @@ void RunDriver::openRun(const std::string& setupFileName) {
     fatalError("Error: Another run of this setup is in progress",
                setup.file + ": both would work in the same folders. Wait for it, or run a copy under another name.");
   }
-  const std::string logFile = filePrefix_ + ".log";
+  const std::string logFile = runFilePath(filePrefix_, run_files::kLog);
   const std::string keptLog = keepEarlierFile(logFile);
   std::string reason;
   if (!state_.log.open(logFile, reason)) fatalError("Error: Unable to open " + logFile, reason);
@@ -114,7 +115,7 @@ void RunDriver::openRun(const std::string& setupFileName) {
   state_.log.line("Setup file: " + setup.file);
   if (!keptLog.empty()) state_.log.line("The log of the earlier run was kept as " + keptLog);
 
-  const std::string terminationLogProblem = openTerminationLog(filePrefix_ + "_Termination.log");
+  const std::string terminationLogProblem = openTerminationLog(runFilePath(filePrefix_, run_files::kTerminationLog));
   const std::string progressProblems = state_.progress.progressInit(logFile, environmentValue("VOLK_PROGRESS"));
   for (const std::string_view problems :
        {std::string_view(terminationLogProblem), std::string_view(progressProblems)}) {
@@ -186,14 +187,14 @@ void RunDriver::openResults() {
 void RunDriver::putEarlierReportAside() {
   if (results_->earlierEvaluations() != nullptr) {
     std::error_code ignored;
-    std::filesystem::remove(reportPath(filePrefix_), ignored);
-  } else if (const std::string kept = keepEarlierFile(reportPath(filePrefix_)); !kept.empty()) {
+    std::filesystem::remove(runFilePath(filePrefix_, run_files::kReport), ignored);
+  } else if (const std::string kept = keepEarlierFile(runFilePath(filePrefix_, run_files::kReport)); !kept.empty()) {
     state_.log.line("The report of the earlier run was kept as " + kept);
   }
 }
 
 void RunDriver::openSeries() {
-  const std::string path = filePrefix_ + "_Series.dat";
+  const std::string path = runFilePath(filePrefix_, run_files::kSeries);
   const bool goesOn = results_->earlierEvaluations() != nullptr;
   if (!goesOn) keepEarlierFile(path);
   if (runner_->shownMeasures().empty()) return;
@@ -205,6 +206,7 @@ void RunDriver::openSeries() {
   run.observations = runner_->readShownObservations();
   run.periodFirst = secondNumber(config_.period.start);
   run.periodLast = secondNumber(config_.period.end);
+  run.initialValues = ToModelScale(parameters_->searchSpace(), parameters_->searchSpace().initial);
   series_ = std::make_unique<SeriesRecorder>(path, std::move(run), runTimeClock,
                                              [this](std::string_view text) { state_.log.warning(text); });
   if (goesOn) {
@@ -229,12 +231,12 @@ TaskOutcome RunDriver::runTask() {
   return outcome;
 }
 
-std::vector<std::string> RunDriver::closingLines(std::string_view terminationMessage) const {
-  std::vector<std::string> lines{std::string(terminationMessage), "Ended: " + dateAndTimeNow()};
+std::vector<std::string> RunDriver::closingLines(const Ending& ending) const {
+  std::vector<std::string> lines{ending.closingLine, "Ended: " + ending.time};
   if (!reporter_ || !reporter_->best()) return lines;
   const std::vector<std::string> scales = aggregator_->scaleLines();
   lines.insert(lines.end(), scales.begin(), scales.end());
-  const RunReporter::Best& best = *reporter_->best();
+  const BestEvaluation& best = *reporter_->best();
   lines.push_back(fmt::format("Best evaluation: {}", best.number));
   lines.push_back("Best aggregate: " + formatReal(best.aggregate));
   const std::vector<std::string>& names = parameters_->searchSpace().names;
@@ -244,32 +246,60 @@ std::vector<std::string> RunDriver::closingLines(std::string_view terminationMes
   return lines;
 }
 
-bool RunDriver::closeResults(std::string_view terminationMessage, std::string& reason,
-                             std::span<const std::string> report) {
+/// What is known of the run now that it has ended, for the record of it.
+void RunDriver::completeRecord(const Ending& ending) {
+  RunRecord& record = results_->record().record();
+  record.stage = ending.stage;
+  record.message = ending.message;
+  record.ended = ending.time;
+  if (!reporter_) return;
+  record.initialEvaluation = reporter_->initial();
+  if (const auto& best = reporter_->best()) record.best = ShownEvaluation{best->number, best->aggregate};
+  record.evaluations = reporter_->evaluationCount();
+  record.failed = reporter_->failedCount();
+  record.failuresByKind.clear();
+  for (const auto& [kind, count] : reporter_->failures().counts()) {
+    record.failuresByKind.emplace_back(failureKindKey(kind), count.count);
+  }
+  record.scales.clear();
+  if (aggregator_->scaleLines().empty()) return;  // there are none, or they are not known
+  for (std::size_t i = 0; i < config_.objectives.size(); ++i) {
+    record.scales.push_back({config_.objectives[i].name, aggregator_->sigma()[i], aggregator_->mu()[i]});
+  }
+}
+
+std::optional<RunDriver::Unwritten> RunDriver::closeResults(const Ending& ending, std::span<const std::string> report) {
   if (reporter_) reporter_->settle(*aggregator_);
   if (series_) series_->finish(reporter_->best());
-  std::vector<std::string> lines = closingLines(terminationMessage);
+  std::vector<std::string> lines = closingLines(ending);
   lines.insert(lines.end(), report.begin(), report.end());
   const EndingSignalsHeld held;
   signalState.resultFileDescriptor = -1;
-  return !results_ || results_->table().finish(lines, reason);
+  if (!results_) return std::nullopt;
+  std::optional<Unwritten> unwritten;
+  std::string reason;
+  if (!results_->table().finish(lines, reason)) unwritten = {results_->table().path(), reason};
+  completeRecord(ending);
+  if (!results_->record().end(reason) && !unwritten) unwritten = {results_->record().path(), reason};
+  return unwritten;
 }
 
-void RunDriver::reportRun(RunStateShown state, std::string_view message) {
+void RunDriver::reportRun() {
   if (!config_.writesReport || !results_ || results_->table().path().empty()) return;
   std::string reason;
-  if (!writeReport(config_, filePrefix_, RunEnding{state, std::string(message)}, reason)) {
+  if (!writeReport(config_, filePrefix_, reason)) {
     state_.log.warning("The report cannot be written: " + reason);
   }
 }
 
 void RunDriver::finish(const TaskOutcome& outcome) {
   results_->close();
-  std::string reason;
-  if (!closeResults(outcome.terminationMessage, reason, outcome.report)) {
-    fatalError("Error: Unable to write to " + results_->table().path(), reason);
+  results_->writeTables(outcome.tables);
+  const Ending ending{RunStage::finished, outcome.terminationMessage, outcome.terminationMessage};
+  if (const auto unwritten = closeResults(ending, outcome.report)) {
+    fatalError("Error: Unable to write to " + unwritten->path, unwritten->reason);
   }
-  reportRun(RunStateShown::finished, outcome.terminationMessage);
+  reportRun();
   state_.log.line("");
   const int count = reporter_->evaluationCount();
   state_.log.line(count == 1 ? fmt::format("1 model evaluation, {} failed", reporter_->failedCount())
@@ -304,27 +334,26 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
   if (!text.empty()) {
     if (!detail.empty()) text.append("\n").append(detail);
     if (reporter_ && reporter_->failedCount() > 0)
-      text += fmt::format("\nfailed model runs are described in {}", kFailedRunFileName);
+      text +=
+          fmt::format("\nfailed model runs are described in {}", fileNameOf(results_->failedRuns().paths().forPeople));
     state_.log.line("");
     if (reporter_) logFailures();
     state_.log.line(text);
     showMessage(text);
   }
-  std::string reason;
-  closeResults(message, reason);              // the run has failed already, with the first reason
-  if (launcher_) launcher_->haltProcesses();  // no model waits for the report
-  reportRun(RunStateShown::failed, text);
+  closeResults({RunStage::failed, std::string(message), text});  // it has failed already, with the first reason
+  if (launcher_) launcher_->haltProcesses();                     // no model waits for the report
+  reportRun();
   return endEarly(message);
 }
 
 int RunDriver::endCancelled(std::string_view message) {
   showMessage(message, {}, MessageType::information);
-  std::string reason;
-  if (!closeResults(message, reason)) {
-    state_.log.line(fmt::format("Error: Unable to write to {}\n{}", results_->table().path(), reason));
+  if (const auto unwritten = closeResults({RunStage::cancelled, std::string(message), std::string(message)})) {
+    state_.log.line(fmt::format("Error: Unable to write to {}\n{}", unwritten->path, unwritten->reason));
   }
   if (launcher_) launcher_->haltProcesses();
-  reportRun(RunStateShown::cancelled, message);
+  reportRun();
   return endEarly(message);
 }
 

@@ -6,13 +6,13 @@
 #include <string>
 #include <string_view>
 
+#include "common/clock.h"
 #include "evaluation/evaluator.h"
 #include "evaluation/failed_run_policy.h"
 #include "evaluation/model_run.h"
 #include "measures/objective_functions.h"
 #include "parameters/parameter_model.h"
 #include "platform/processes/process_launcher.h"
-#include "report/report_data.h"
 #include "run/results/run_lock.h"
 #include "run/results/run_results.h"
 #include "run/results/series_recorder.h"
@@ -36,6 +36,19 @@ class RunDriver final {
   int run(const std::string& setupFileName);
 
  private:
+  /// How the run ends.
+  struct Ending {
+    RunStage stage = RunStage::finished;
+    std::string closingLine;  ///< of the result file
+    std::string message;      ///< with all that is known of the reason
+    std::string time = dateAndTimeNow();
+  };
+  /// A file that could not be brought to its end.
+  struct Unwritten {
+    std::string path;
+    std::string reason;
+  };
+
   /// Settles the run's rank in its job: -1 and a plain local run without MPI or alone in its job. Throws FatalError
   /// when a job launcher started several processes that MPI cannot bring together, as they would all write the same
   /// files.
@@ -48,11 +61,12 @@ class RunDriver final {
   void openSeries();
   /// Runs the task, where there is one, and writes the files that it gives.
   TaskOutcome runTask();
-  /// False, with the system's reason, when the results could not be brought to their end. `report`: what the task
+  /// Brings the results and the record of the run to their end; what failed, if anything did. `report`: what the task
   /// found.
-  bool closeResults(std::string_view terminationMessage, std::string& reason, std::span<const std::string> report = {});
+  std::optional<Unwritten> closeResults(const Ending& ending, std::span<const std::string> report = {});
+  void completeRecord(const Ending& ending);
   /// The report of what was done, where there is anything and the setup wants it. What goes wrong with it is a warning.
-  void reportRun(RunStateShown state, std::string_view message);
+  void reportRun();
   void finish(const TaskOutcome& outcome);
   void logFailures();
   int endInError(std::string_view message, std::string_view detail);
@@ -62,7 +76,7 @@ class RunDriver final {
   /// On an MPI master: stops the workers and finalises MPI; ends the whole job when that is not possible.
   void leaveJob(int exitCode, std::string_view ending);
   void endProgress(std::string_view ending);
-  std::vector<std::string> closingLines(std::string_view terminationMessage) const;
+  std::vector<std::string> closingLines(const Ending& ending) const;
 
   RunState state_;
   RunLock lock_;

@@ -8,6 +8,7 @@
 
 #include <fmt/format.h>
 
+#include "common/run_files.h"
 #include "common/text.h"
 
 namespace mirevo {
@@ -21,8 +22,8 @@ ModelDescription describeModel(const RunConfig& config) {
   model.period = config.period;
   model.objectives = config.objectives;
   for (const SavedOutputFile& file : config.savedOutputFiles) model.savedFiles.push_back(file.fileName);
-  model.savedFolder = fmt::format("{}/{}_Saved", config.setupFolder, config.setupName);
-  model.failedFolderPrefix = processFolderPrefix(config) + "_Failed";
+  model.savedFolder = runFilePath(config.setupFolder + "/" + config.setupName, run_files::kSavedFolder);
+  model.failedFolderPrefix = runFilePath(processFolderPrefix(config), run_files::kFailedFolder);
   model.keepSimulatedValues = config.keepsSimulatedValues();
   return model;
 }
@@ -30,7 +31,7 @@ ModelDescription describeModel(const RunConfig& config) {
 LauncherSettings launcherSettings(const RunConfig& config, int slotCount, int firstFolderNumber) {
   LauncherSettings settings;
   settings.baseFolder = config.baseFolder;
-  settings.processFolderPrefix = processFolderPrefix(config) + "_Process";
+  settings.processFolderPrefix = runFilePath(processFolderPrefix(config), run_files::kProcessFolder);
   settings.batchItems = config.batchItems;
   settings.slotCount = slotCount;
   settings.firstFolderNumber = firstFolderNumber;

@@ -1,6 +1,5 @@
 #include "run/run_reporter.h"
 
-#include <algorithm>
 #include <cmath>
 
 #include "common/clock.h"
@@ -10,7 +9,12 @@ namespace mirevo {
 
 RunReporter::RunReporter(RunState& state, ResultFile& results, FailedRunFile& failedRuns, const SearchSpace& space,
                          SimulatedValuesFile* simulatedValues)
-    : state_(state), results_(results), failedRuns_(failedRuns), space_(space), simulatedValues_(simulatedValues) {}
+    : state_(state),
+      results_(results),
+      failedRuns_(failedRuns),
+      space_(space),
+      simulatedValues_(simulatedValues),
+      initial_(ToModelScale(space, space.initial)) {}
 
 void RunReporter::message(std::string_view text) {
   state_.log.line(text);
@@ -26,14 +30,14 @@ void RunReporter::recordEvaluation(std::span<const double> set, const Evaluation
   // The row comes last: where it stands, all that belongs to it does, too, whenever the program is ended.
   if (!result.ok()) failedRuns_.add(values, result);
   if (result.ok() && simulatedValues_ != nullptr) simulatedValues_->add(result);
-  results_.addRow(values, result);
+  results_.addRow(resultRow(values, result));
 }
 
 void RunReporter::evaluationFinished(std::span<const double> set, const EvaluationResult& result) {
   if (!result.ok()) state_.log.line("   " + result.failure->reason);  // below the message that it failed
   const std::vector<double> values = ToModelScale(space_, set);
   count(values, result, dateAndTimeWithZone());
-  recordSeries(set, values, result);
+  recordSeries(values, result);
   state_.progress.progressStep();
   if (const std::string problem = state_.progress.takeProblem(); !problem.empty()) state_.log.warning(problem);
   requireLogWritten();
@@ -44,7 +48,7 @@ void RunReporter::evaluationReplayed(std::span<const double> set, const Evaluati
   state_.progress.progressReplayed(result.number, result.ok());
   const std::vector<double> values = ToModelScale(space_, set);
   count(values, result, {});
-  if (!result.shownSeries.empty()) recordSeries(set, values, result);
+  if (!result.shownSeries.empty()) recordSeries(values, result);
 }
 
 void RunReporter::count(const std::vector<double>& parameterValues, const EvaluationResult& result,
@@ -54,18 +58,18 @@ void RunReporter::count(const std::vector<double>& parameterValues, const Evalua
   if (!result.ok()) {
     ++failedCount_;
     failures_.add(result.number, *result.failure);
-  } else if (std::isnan(result.aggregate)) {
+    return;
+  }
+  initial_.consider(result.number, parameterValues);
+  if (std::isnan(result.aggregate)) {
     unsettled_.push_back({result.number, parameterValues, result.objectiveValues});
   } else if (!result.objectiveValues.empty()) {
     considerAsBest(result.number, result.aggregate, parameterValues, foundAt);
   }
 }
 
-void RunReporter::recordSeries(std::span<const double> set, const std::vector<double>& values,
-                               const EvaluationResult& result) {
-  if (recorder_ == nullptr) return;
-  const bool isInitial = std::equal(set.begin(), set.end(), space_.initial.begin(), space_.initial.end());
-  recorder_->evaluationFinished(result, values, isInitial, best_);
+void RunReporter::recordSeries(const std::vector<double>& values, const EvaluationResult& result) {
+  if (recorder_ != nullptr) recorder_->evaluationFinished(result, values, best());
 }
 
 void RunReporter::requireLogWritten() const {
@@ -75,18 +79,12 @@ void RunReporter::requireLogWritten() const {
 
 void RunReporter::takeBestOf(const SearchSummary& search) {
   if (search.best.empty() || !search.bestResult.ok()) return;
-  best_ = Best{search.bestResult.number, search.bestResult.aggregate, ToModelScale(space_, search.best)};
-  isBestOfSearch_ = true;
+  best_.takeOfSearch({search.bestResult.number, search.bestResult.aggregate, ToModelScale(space_, search.best)});
 }
 
 void RunReporter::considerAsBest(int number, double aggregate, const std::vector<double>& parameterValues,
                                  std::string_view foundAt) {
-  if (isBestOfSearch_) return;
-  const bool isBetter =
-      !best_ || aggregate < best_->aggregate || (aggregate == best_->aggregate && number < best_->number);
-  if (!isBetter) return;
-  best_ = Best{number, aggregate, parameterValues};
-  state_.progress.progressBest(number, aggregate, foundAt);
+  if (best_.consider(number, aggregate, parameterValues)) state_.progress.progressBest(number, aggregate, foundAt);
 }
 
 void RunReporter::settle(const ObjectiveAggregator& aggregator) {

@@ -5,10 +5,10 @@
 #include <vector>
 
 #include "algorithms/searches/search_algorithm.h"
+#include "evaluation/chosen_evaluations.h"
 #include "evaluation/evaluation_observer.h"
 #include "measures/objective_functions.h"
 #include "parameters/search_space.h"
-#include "run/results/best_evaluation.h"
 #include "run/results/failed_run_file.h"
 #include "run/results/failure_summary.h"
 #include "run/results/result_file.h"
@@ -44,10 +44,9 @@ class RunReporter final : public EvaluationObserver {
   /// only repeats it. Nothing changes where every evaluation of it failed.
   void takeBestOf(const SearchSummary& search);
 
-  /// The best of the search; without one the evaluation with the smallest aggregate, of equals that with the smallest
-  /// number.
-  using Best = BestEvaluation;
-  const std::optional<Best>& best() const { return best_; }
+  const std::optional<BestEvaluation>& best() const { return best_.best(); }
+  /// The number of the initial evaluation; nothing before one has succeeded.
+  const std::optional<int>& initial() const { return initial_.number(); }
 
   int evaluationCount() const { return evaluationCount_; }
   int failedCount() const { return failedCount_; }
@@ -62,8 +61,8 @@ class RunReporter final : public EvaluationObserver {
     std::vector<double> parameterValues;
     std::vector<double> objectiveValues;
   };
-  /// `values`: the set on the model scale.
-  void recordSeries(std::span<const double> set, const std::vector<double>& values, const EvaluationResult& result);
+  /// `values` on the model scale.
+  void recordSeries(const std::vector<double>& values, const EvaluationResult& result);
   void count(const std::vector<double>& parameterValues, const EvaluationResult& result, std::string_view foundAt);
   void considerAsBest(int number, double aggregate, const std::vector<double>& parameterValues,
                       std::string_view foundAt);
@@ -75,8 +74,8 @@ class RunReporter final : public EvaluationObserver {
   const SearchSpace& space_;
   SimulatedValuesFile* simulatedValues_;
   SeriesRecorder* recorder_ = nullptr;
-  std::optional<Best> best_;
-  bool isBestOfSearch_ = false;
+  BestChoice best_;
+  InitialChoice initial_;
   std::vector<Unsettled> unsettled_;
   int evaluationCount_ = 0;
   int failedCount_ = 0;

@@ -12,6 +12,7 @@
 #include "common/progress_messages.h"
 #include "platform/signals/signal_state.h"
 #include "platform/terminal/front_end.h"
+#include "run/results/run_record.h"
 
 namespace mirevo {
 namespace {
@@ -23,10 +24,25 @@ alignas(16) std::array<char, 65536> handlerStack;
 std::array<char, 64> boxTitle;
 std::size_t boxTitleLength = 0;
 
+/// What stands in the record of the run before the message of a handler that ends it, ready for the handlers.
+struct RecordedEnding {
+  std::array<char, 64> text;
+  std::size_t length = 0;
+
+  void set(RunStage stage) { length = endingBeforeMessage(stage).copy(text.data(), text.size()); }
+  std::string_view view() const noexcept { return {text.data(), length}; }
+};
+RecordedEnding endingOnRequest;
+RecordedEnding endingInCrash;
+
 /// Writes to a terminal or pipe, but never waits for one that takes nothing (a stopped terminal).
 void showFromSignal(int descriptor, std::string_view text, std::string_view title) noexcept {
   pollfd ready{descriptor, POLLOUT, 0};
   if (::poll(&ready, 1, 0) == 1 && (ready.revents & POLLOUT) != 0) writeLineFromSignal(descriptor, text, title);
+}
+
+bool isRequest(int signalNumber) noexcept {
+  return std::find(kEndingRequests.begin(), kEndingRequests.end(), signalNumber) != kEndingRequests.end();
 }
 
 [[noreturn]] void endRun(int signalNumber, std::string_view message) noexcept {
@@ -39,6 +55,9 @@ void showFromSignal(int descriptor, std::string_view text, std::string_view titl
   }
   if (void (*halt)() = signalState.haltProcesses; halt != nullptr) halt();
   if (const int results = signalState.resultFileDescriptor; results >= 0) writeLineFromSignal(results, message, "# ");
+  if (const int record = signalState.runRecordDescriptor; record >= 0) {
+    writeLineFromSignal(record, message, (isRequest(signalNumber) ? endingOnRequest : endingInCrash).view());
+  }
   if (const int records = signalState.messageFileDescriptor; records >= 0) {
     writeLineFromSignal(records, message, progress::kEndedRecord);
     writeLineFromSignal(records, progress::kCompleteRecord);
@@ -59,12 +78,12 @@ std::string_view messageOf(int signalNumber) noexcept {
     case SIGILL:
       return "Illegal instruction";
     case SIGINT:
-      return kInterrupted;
+      return "Control-C send";
     case SIGSEGV:
     case SIGBUS:
       return "Illegal storage access";
     default:
-      return kTerminationRequest;
+      return "Termination request";
   }
 }
 
@@ -99,10 +118,6 @@ extern "C" void handleFloatingPoint(int signalNumber, siginfo_t* information, vo
 }
 
 using SignalAction = void (*)(int, siginfo_t*, void*);
-
-bool isRequest(int signalNumber) {
-  return std::find(kEndingRequests.begin(), kEndingRequests.end(), signalNumber) != kEndingRequests.end();
-}
 
 /// Whoever started the program may have blocked the signal.
 void install(int signalNumber, SignalAction handler) {
@@ -168,6 +183,9 @@ void installSignalHandlers() {
   signalState.writesStandardOutput = night && frontEnd != "QMON" && frontEnd != "WIN";
 
   boxTitleLength = (programName() + ": ").copy(boxTitle.data(), boxTitle.size());
+
+  endingOnRequest.set(RunStage::cutOff);
+  endingInCrash.set(RunStage::failed);
 
   stack_t stack{};
   stack.ss_sp = handlerStack.data();

@@ -4,6 +4,7 @@
 
 #include <fmt/format.h>
 
+#include "common/run_files.h"
 #include "viewer/viewer.h"
 
 namespace {
@@ -31,8 +32,9 @@ int main(int argc, char** argv) {
   }
   const std::string baseName = mirevo::baseNameOfSetup(argument);
   bool isKnown = false;
-  for (const char* ending : {".kdx", "._spi_", ""})
-    isKnown = isKnown || ::access((baseName + ending).c_str(), F_OK) == 0;
+  for (const std::string& path :
+       {baseName + ".kdx", mirevo::runFilePath(baseName, mirevo::run_files::kMessages), baseName})
+    isKnown = isKnown || ::access(path.c_str(), F_OK) == 0;
   if (!isKnown) {
     fmt::print(stderr, "mirevo-viewer: {}: there is no such setup and no run of it\n", argument);
     return 1;

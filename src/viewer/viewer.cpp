@@ -13,6 +13,7 @@
 #include <fmt/format.h>
 
 #include "common/clock.h"
+#include "common/run_files.h"
 #include "common/text.h"
 #include "platform/terminal/front_end.h"
 
@@ -34,7 +35,8 @@ double secondsSince1970() {
 }  // namespace
 
 std::string baseNameOfSetup(std::string_view setupFile) {
-  for (const std::string_view ending : {".kdx", ".log", "._spi_"}) {
+  for (const std::string_view ending :
+       {std::string_view(".kdx"), run_files::kLog.extension, run_files::kMessages.extension}) {
     const std::size_t length = setupFile.size() - std::min(setupFile.size(), ending.size());
     if (length > 0 && equalIgnoringCase(setupFile.substr(length), ending))
       return std::string(setupFile.substr(0, length));
@@ -47,7 +49,7 @@ Viewer::Viewer(std::string setupFile, std::unique_ptr<RunProcess> started)
       baseName_(baseNameOfSetup(setupFile_)),
       host_(hostName()),
       started_(std::move(started)),
-      file_(baseName_ + "._spi_"),
+      file_(runFilePath(baseName_, run_files::kMessages)),
       display_(openDisplay()) {
   situation_.setupName = baseName_.substr(baseName_.rfind('/') + 1);
   situation_.wasStarted = started_ != nullptr;
@@ -213,7 +215,7 @@ void Viewer::cancelRun() {
     situation_.cancelRequested = true;
     return;
   }
-  const std::string killFile = baseName_ + "._kill_";
+  const std::string killFile = runFilePath(baseName_, run_files::kKill);
   const int descriptor = ::open(killFile.c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0666);
   if (descriptor < 0) {
     situation_.problem = fmt::format("Unable to cancel: {}: {}", killFile, std::strerror(errno));
@@ -231,9 +233,9 @@ void Viewer::sayGoodbye() const {
     return;
   }
   writeToOutput(
-      fmt::format("The run goes on as process {}.\n  mirevo-viewer '{}'\nshows it again;\n  touch '{}._kill_'\n"
+      fmt::format("The run goes on as process {}.\n  mirevo-viewer '{}'\nshows it again;\n  touch '{}'\n"
                   "cancels it.\n",
-                  started_->process(), setupFile_, baseName_));
+                  started_->process(), setupFile_, runFilePath(baseName_, run_files::kKill)));
 }
 
 }  // namespace mirevo

@@ -13,10 +13,11 @@ namespace fs = std::filesystem;
 const std::vector<std::string>& earlierFiles() {
   static const std::vector<std::string> names = {"basin.log",           "basin.dat",          "basin_Optimisation.dat",
                                                  "calSimErr.dat",       "basin_Band_1.csv",   "basin_Sensitivity.dat",
+                                                 "basin_Run.dat",       "basin_Failures.dat", "basin_Quantiles.dat",
                                                  "basin_Saved/1/a.csv", "basin_Process1/old", "basin._kill_"};
   return names;
 }
-constexpr std::size_t kKeptEarlierFiles = 7;
+constexpr std::size_t kKeptEarlierFiles = 10;
 
 std::string readFile(const fs::path& path) {
   std::ifstream file(path, std::ios::binary);
@@ -122,7 +123,9 @@ RunningProgram FaultyRun::start(const Environment& environment, const std::vecto
 
 std::map<std::string, std::string> FaultyRun::outputs() const {
   std::map<std::string, std::string> found;
-  for (const std::string& name : {std::string("calSimErr.dat"), std::string("basin_Band_1.csv"), resultFileName_}) {
+  for (const std::string& name :
+       {std::string("calSimErr.dat"), std::string("basin_Failures.dat"), std::string("basin_Band_1.csv"),
+        std::string("basin_Quantiles.dat"), std::string("basin_Covariance.dat"), resultFileName_}) {
     if (folder_.exists(name)) found[name] = withoutDates(folder_.read(name));
   }
   if (!folder_.exists("basin_Saved")) return found;

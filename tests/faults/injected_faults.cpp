@@ -59,22 +59,6 @@ constexpr ErrorOfCall kErrors[] = {{"open-to-write", ENOSPC, "once"},
                                    {"clone", EAGAIN, "once"},
                                    {"clone", ENOMEM, "lasting"}};
 
-/// What may fail unmentioned, and why that is right.
-bool mayPassSilently(const Call& call) {
-  const auto& [name, path] = call;
-  if (name == "set-times") return true;                                    // a copy with other times is still a copy
-  if (name == "access" && path == "basin._kill_") return true;             // looked for again at once
-  if (path.ends_with("mirevo_batch.log")) return name != "open-to-write";  // made anew
-  if (name == "close" && (path == "basin._spi_" || path.ends_with("(deleted)"))) return true;  // another took its place
-  if (name == "open-to-read" && path == "basin.kdx") return true;  // to lock it; reading it follows
-  // What cannot be compared is written anew, beside the one of before.
-  if ((name == "read" || name == "open-to-read") && path.starts_with("basin_Band_")) return true;
-  if (name == "unlink" && path.ends_with(".part")) return true;  // where one is in the way, making it fails
-  // The same for this one; its only line is the process's last word, which the exit code and the log say, too.
-  if (path == "basin_Termination.log" && name != "open-to-write") return true;
-  return name == "stat";  // where it matters, the call that follows tells
-}
-
 std::string kindOf(const std::string& path) {
   const auto isIn = [&path](const char* folder) { return path.starts_with(folder); };
   if (path == "basin.kdx") return "setup file";
@@ -84,6 +68,12 @@ std::string kindOf(const std::string& path) {
   if (path == "basin._spi_") return "message file";
   if (path == "basin._kill_") return "kill file";
   if (isIn("calSimErr")) return "failed-run file";
+  if (isIn("basin_Failures")) return "failure table";
+  if (isIn("basin_Run.")) return "run record";
+  for (const char* table : {"Covariance", "Correlation", "ParameterLimits", "Jacobian", "Sensitivities", "Quantiles",
+                            "SampleCorrelation"}) {
+    if (isIn(fmt::format("basin_{}.", table).c_str())) return "analysis table";
+  }
   if (isIn("basin_Saved")) return "saved output files";
   if (isIn("basin_Band_")) return "band file";
   if (isIn("basin_Sensitivity")) return "sensitivity file";
@@ -101,6 +91,23 @@ std::string kindOf(const std::string& path) {
   if (path.ends_with(".tpl")) return "template";
   if (isIn("model")) return "model folder";
   return "other files";
+}
+
+/// What may fail unmentioned, and why that is right.
+bool mayPassSilently(const Call& call) {
+  const auto& [name, path] = call;
+  if (name == "set-times") return true;                                    // a copy with other times is still a copy
+  if (name == "access" && path == "basin._kill_") return true;             // looked for again at once
+  if (path.ends_with("mirevo_batch.log")) return name != "open-to-write";  // made anew
+  if (name == "close" && (path == "basin._spi_" || path.ends_with("(deleted)"))) return true;  // another took its place
+  if (name == "open-to-read" && path == "basin.kdx") return true;  // to lock it; reading it follows
+  // What cannot be compared is written anew, beside the one of before.
+  const std::string kind = kindOf(path);
+  if ((name == "read" || name == "open-to-read") && (kind == "band file" || kind == "analysis table")) return true;
+  if (name == "unlink" && path.ends_with(".part")) return true;  // where one is in the way, making it fails
+  // The same for this one; its only line is the process's last word, which the exit code and the log say, too.
+  if (path == "basin_Termination.log" && name != "open-to-write") return true;
+  return name == "stat";  // where it matters, the call that follows tells
 }
 
 std::map<Call, int> countCalls(const std::string& record) {

@@ -1,7 +1,6 @@
 // Any bytes as a result file: no crash; cut off anywhere, it holds the first of its rows and no others; and rows
 // written anew, as a restart does, are the same rows.
 
-#include <cmath>
 #include <cstdint>
 #include <cstdlib>
 #include <string>
@@ -11,20 +10,36 @@
 
 namespace {
 
+using mirevo::ResultColumns;
+using mirevo::ResultRow;
 using mirevo::ResultTable;
 
 void require(bool promise) {
   if (!promise) std::abort();
 }
 
-bool isSame(const ResultTable::Row& a, const ResultTable::Row& b) {
-  if (a.number != b.number || a.ok != b.ok || a.values.size() != b.values.size()) return false;
-  for (std::size_t i = 0; i < a.values.size(); ++i) {
-    const bool bothMissing = std::isnan(a.values[i]) && std::isnan(b.values[i]);
-    if (!bothMissing && (a.values[i] != b.values[i] || std::signbit(a.values[i]) != std::signbit(b.values[i])))
-      return false;
+/// The columns of the first line that is a header row with at least one of a parameter, or none.
+ResultColumns columnsOf(std::string_view text) {
+  ResultColumns columns;
+  for (const std::string_view line : mirevo::splitLines(text)) {
+    const std::string_view header = mirevo::trimTrailing(line);
+    if (!mirevo::isResultHeader(header)) continue;
+    constexpr std::size_t kOthers = 3;  // number, status and aggregate
+    std::string_view rest = header;
+    for (std::size_t i = 0; i < mirevo::cellCount(header); ++i) {
+      const std::size_t tab = rest.find('\t');
+      if (i >= 2 && columns.parameters.size() + kOthers < mirevo::cellCount(header)) {
+        columns.parameters.emplace_back(rest.substr(0, tab));
+      }
+      rest.remove_prefix(tab == rest.npos ? rest.size() : tab + 1);
+    }
+    break;
   }
-  return true;
+  return columns;
+}
+
+bool isSame(const ResultRow& a, const ResultRow& b) {
+  return mirevo::resultRowText(a) == mirevo::resultRowText(b);
 }
 
 void requireFirstRowsOf(const ResultTable& whole, const ResultTable& part) {
@@ -32,15 +47,9 @@ void requireFirstRowsOf(const ResultTable& whole, const ResultTable& part) {
   for (std::size_t i = 0; i < part.rows.size(); ++i) require(isSame(part.rows[i], whole.rows[i]));
 }
 
-std::string written(const ResultTable& table) {
-  std::string text = "Evaluation\tStatus";
-  for (std::size_t i = 0; i < table.columns.size(); ++i) text += "\tcolumn";
-  text += '\n';
-  for (const ResultTable::Row& row : table.rows) {
-    text += std::to_string(row.number) + (row.ok ? "\tOK" : "\tFAILED");
-    for (const double value : row.values) text += '\t' + mirevo::formatReal(value);
-    text += '\n';
-  }
+std::string written(const ResultTable& table, const ResultColumns& columns) {
+  std::string text = mirevo::resultHeader(columns) + '\n';
+  for (const ResultRow& row : table.rows) text += mirevo::resultRowText(row) + '\n';
   return text;
 }
 
@@ -49,15 +58,16 @@ std::string written(const ResultTable& table) {
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
   if (size < 2) return 0;
   const std::string_view text(reinterpret_cast<const char*>(data) + 2, size - 2);
-  const ResultTable table = mirevo::readResultTable(text);
-  require(table.rows.empty() || table.hasHeader());
-  for (const ResultTable::Row& row : table.rows) {
-    require(row.number >= 1 && row.values.size() == table.columns.size());
+  const ResultColumns columns = columnsOf(text);
+  const ResultTable table = mirevo::readResultTable(text, columns);
+  require(table.rows.empty() || table.hasExpectedColumns);
+  for (const ResultRow& row : table.rows) {
+    require(row.number >= 1 && row.parameters.size() == columns.parameters.size());
   }
   const std::size_t length = text.size() * (data[0] * 256U + data[1]) / 65535U;
-  requireFirstRowsOf(table, mirevo::readResultTable(text.substr(0, length)));
-  if (!table.hasHeader()) return 0;
-  const ResultTable again = mirevo::readResultTable(written(table));
+  requireFirstRowsOf(table, mirevo::readResultTable(text.substr(0, length), columns));
+  if (!table.hasExpectedColumns) return 0;
+  const ResultTable again = mirevo::readResultTable(written(table, columns), columns);
   require(again.rows.size() == table.rows.size() && again.unusableLines == 0);
   requireFirstRowsOf(table, again);
   return 0;

@@ -5,6 +5,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "common/data_table.h"
 #include "integration/model_folder.h"
 
 namespace mirevo::testing {
@@ -15,22 +16,14 @@ using ::testing::Contains;
 using ::testing::HasSubstr;
 using ::testing::StartsWith;
 
-/// The numbers of a report's row: those behind `name` in the first comment that begins with it, after a line that
-/// begins with `table`.
-std::vector<double> reportRow(const ResultTable& results, const std::string& table, const std::string& name) {
-  bool inTable = false;
-  for (const std::string& comment : results.comments) {
-    const auto begin = comment.find_first_not_of("# ");
-    const std::string line = begin == std::string::npos ? "" : comment.substr(begin);
-    if (inTable && line.starts_with(name + " ")) {
-      std::istringstream cells(line.substr(name.size()));
-      std::vector<double> numbers;
-      for (double number = 0.0; cells >> number;) numbers.push_back(number);
-      return numbers;
-    }
-    inTable = line.empty() ? false : inTable || line.starts_with(table);
+/// The number in the column `heading` of the first row that begins with these cells; NaN where there is none.
+double cellOf(const std::string& text, const std::vector<std::string>& first, const std::string& heading) {
+  const ReadTable table = readDataTable(text);
+  for (const std::vector<std::string>& cells : table.rows) {
+    if (!std::equal(first.begin(), first.end(), cells.begin())) continue;
+    return realCell(cells.at(table.column(heading).value())).value();
   }
-  return {};
+  return std::nan("");
 }
 
 TEST(LocalSensitivity, OfALinearModelGivesTheCovarianceOfItsClosedForm) {
@@ -57,19 +50,35 @@ TEST(LocalSensitivity, OfALinearModelGivesTheCovarianceOfItsClosedForm) {
   const double deviationA = std::sqrt(variance * ss / determinant);
   const double deviationB = std::sqrt(variance * 365.0 / determinant);
   const double t = 1.966521;  // 97.5 % quantile of Student's t with 363 degrees of freedom
-  const auto a = reportRow(results, "Parameter (model scale)", "a");
-  const auto b = reportRow(results, "Parameter (model scale)", "b");
-  ASSERT_EQ(a.size(), 4U);
-  ASSERT_EQ(b.size(), 4U);
-  EXPECT_NEAR(a[1] / deviationA, 1.0, 2e-5);
-  EXPECT_NEAR(b[1] / deviationB, 1.0, 2e-5);
-  EXPECT_NEAR(a[2], 4.0 - t * deviationA, 1e-4);
-  EXPECT_NEAR(b[3], 1.0 + t * deviationB, 1e-4);
-  EXPECT_NEAR(reportRow(results, "Correlation", "a")[1], -s / std::sqrt(365.0 * ss), 1e-4);
-  EXPECT_NEAR(reportRow(results, "Covariance", "b")[0], -variance * s / determinant, 1e-7);
+  const std::string limits = folder.read("basin_ParameterLimits.dat");
+  EXPECT_NEAR(cellOf(limits, {"a"}, "StandardDeviation") / deviationA, 1.0, 2e-5);
+  EXPECT_NEAR(cellOf(limits, {"b"}, "StandardDeviation") / deviationB, 1.0, 2e-5);
+  EXPECT_NEAR(cellOf(limits, {"a"}, "Lower95"), 4.0 - t * deviationA, 1e-6);
+  EXPECT_NEAR(cellOf(limits, {"b"}, "Upper95"), 1.0 + t * deviationB, 1e-6);
+  EXPECT_NEAR(cellOf(folder.read("basin_Correlation.dat"), {"a"}, "b"), -s / std::sqrt(365.0 * ss), 1e-5);
+  const std::string covariance = folder.read("basin_Covariance.dat");
+  EXPECT_NEAR(cellOf(covariance, {"b"}, "a"), -variance * s / determinant, 1e-7);
+  // At full precision the rows of the Jacobian give the same matrix: s^2 (J'WJ)^-1.
+  double jj[2][2] = {};
+  double rr = 0.0;
+  const ReadTable jacobian = readDataTable(folder.read("basin_Jacobian.dat"));
+  ASSERT_EQ(jacobian.columns, (std::vector<std::string>{"Measure", "Time", "Weight", "Residual", "a", "b"}));
+  ASSERT_EQ(jacobian.rows.size(), 365U);
+  EXPECT_EQ(jacobian.rows[1][1], "2001-01-02T00:00:00");
+  for (const std::vector<std::string>& cells : jacobian.rows) {
+    const double weight = *realCell(cells[2]);
+    const double derivatives[] = {*realCell(cells[4]), *realCell(cells[5])};
+    rr += weight * *realCell(cells[3]) * *realCell(cells[3]);
+    for (int i = 0; i < 2; ++i) {
+      for (int j = 0; j < 2; ++j) jj[i][j] += weight * derivatives[i] * derivatives[j];
+    }
+  }
+  const double entry = -rr / 363.0 * jj[0][1] / (jj[0][0] * jj[1][1] - jj[0][1] * jj[1][0]);
+  EXPECT_NEAR(cellOf(covariance, {"a"}, "b") / entry, 1.0, 1e-12);
   // d RMSE / da = mean(-1 - sine) / RMSE
   const double rmse = std::sqrt(squares / 365.0);
-  EXPECT_NEAR(reportRow(results, "Derivatives of objective functions", "a")[0], -(1.0 + s / 365.0) / rmse, 1e-4);
+  EXPECT_NEAR(cellOf(folder.read("basin_Sensitivities.dat"), {"a", "objective", "fit"}, "Derivative"),
+              -(1.0 + s / 365.0) / rmse, 1e-4);
   EXPECT_THAT(results.comments, Contains(HasSubstr("1. a")));
 
   EXPECT_THAT(folder.read("basin.log"), HasSubstr("\nParameter covariance: 365 observations, 2 parameters, 363 "));
@@ -100,12 +109,9 @@ exec awk '
   const ProgramResult run = runProgram({(folder / "basin.kdx")});
   ASSERT_EQ(run.exitCode, 0) << run.error;
   const ResultTable results = readResults(folder.read("basin_Sensitivity.dat"));
-  const auto b1 = reportRow(results, "Parameter (model scale)", "a");
-  const auto b2 = reportRow(results, "Parameter (model scale)", "b");
-  ASSERT_EQ(b1.size(), 4U);
-  ASSERT_EQ(b2.size(), 4U);
-  EXPECT_NEAR(b1[1] / 2.7070075241E+00, 1.0, 5e-4);
-  EXPECT_NEAR(b2[1] / 7.2668688436E-06, 1.0, 5e-4);
+  const std::string limits = folder.read("basin_ParameterLimits.dat");
+  EXPECT_NEAR(cellOf(limits, {"a"}, "StandardDeviation") / 2.7070075241E+00, 1.0, 5e-4);
+  EXPECT_NEAR(cellOf(limits, {"b"}, "StandardDeviation") / 7.2668688436E-06, 1.0, 5e-4);
   EXPECT_THAT(results.comments, Contains("# Standard error of a residual: 0.101879"));  // 1.0187876330E-01 certified
   EXPECT_THAT(results.comments, Contains(StartsWith("# Warning: Parameters a and b are correlated by -0.99")));
 }
@@ -121,14 +127,13 @@ TEST(Uncertainty, SummaryAndBandAreThoseOfTheSample) {
       runProgram({folder.writeSetup({.option = 3, .maxEvaluations = 400, .modelArguments = "--fail-above 6.2"})});
   ASSERT_EQ(run.exitCode, 0) << run.error;
   const ResultTable results = readResults(folder.read("basin.dat"));
-  const auto a = reportRow(results, "Parameter (search scale)", "a");
-  ASSERT_EQ(a.size(), 7U);
-  EXPECT_NEAR(a[0], 5.0, 0.005);
-  EXPECT_NEAR(a[1], 0.5, 0.01);
-  EXPECT_NEAR(a[2], 5.0 - 1.645 * 0.5, 0.02);
+  const std::string quantiles = folder.read("basin_Quantiles.dat");
+  EXPECT_NEAR(cellOf(quantiles, {"parameter", "a"}, "Mean"), 5.0, 0.005);
+  EXPECT_NEAR(cellOf(quantiles, {"parameter", "a"}, "StandardDeviation"), 0.5, 0.01);
+  EXPECT_NEAR(cellOf(quantiles, {"parameter", "a"}, "5 %"), 5.0 - 1.645 * 0.5, 0.02);
+  EXPECT_EQ(cellOf(quantiles, {"measure", "flow"}, "Count"), 397);
   EXPECT_THAT(results.comments, Contains(StartsWith("# Uncertainty analysis: 400 evaluations, 3 failed")));
-  EXPECT_EQ(reportRow(results, "Output measure", "flow").size(), 7U);
-  EXPECT_LT(std::abs(reportRow(results, "Sample correlation", "a")[1]), 0.15);
+  EXPECT_LT(std::abs(cellOf(folder.read("basin_SampleCorrelation.dat"), {"a"}, "b")), 0.15);
 
   std::istringstream band(folder.read("basin_Band_1.csv"));
   std::vector<std::string> lines;

@@ -131,12 +131,39 @@ TEST(Report, OfARunThatGoesOnOrWasCutOffSaysSoAndLeavesItsFilesAlone) {
   EXPECT_THAT(reportData(folder),
               AllOf(HasSubstr(R"("state":"cut off")"), HasSubstr("1 line of the result file is cut off"),
                     HasSubstr(R"("evaluations":1,)")));
-  for (const auto& [ending, state] : {std::pair{"Termination request", "cut off"},
-                                      {"Control-C send", "cut off"},
-                                      {"Illegal storage access", "failed"}}) {
-    folder.write("basin.dat", fmt::format("{}\n# {}\n", results, ending));
+  folder.write("basin.dat", results);
+  for (const auto& [signal, state, message] :
+       {std::tuple{SIGTERM, "cut off", "Termination request"}, {SIGABRT, "failed", "Abnormal termination"}}) {
+    std::filesystem::remove(folder / "first");
+    RunningProgram run({folder / "basin.kdx"});
+    ASSERT_TRUE(waitUntil([&] { return folder.read("basin.dat").find("\n1\tOK\t") != std::string::npos; }));
+    run.send(signal);
+    run.wait();
     EXPECT_EQ(makeReport(folder).exitCode, 0);
-    EXPECT_THAT(reportData(folder), HasSubstr(fmt::format(R"("state":"{}","message":"{}")", state, ending)));
+    EXPECT_THAT(reportData(folder), HasSubstr(fmt::format(R"("state":"{}","message":"{}")", state, message)));
+  }
+}
+
+// Results without the files that this version adds: the report has all that the others hold.
+TEST(Report, OfResultsOfAnEarlierVersion) {
+  const ModelFolder folder;
+  ASSERT_EQ(runProgram({folder.writeSetup({.maxEvaluations = 30, .modelArguments = "--fail-above 9"})}).exitCode, 0);
+  const std::string data = reportData(folder);
+  ASSERT_THAT(data, Not(HasSubstr(R"("failures":[])")));
+  for (const char* file : {"basin_Run.dat", "basin_Failures.dat"}) std::filesystem::remove(folder / file);
+  EXPECT_EQ(makeReport(folder).exitCode, 0);
+  const std::string again = reportData(folder);
+  EXPECT_THAT(again,
+              AllOf(HasSubstr(R"("failures":[])"), HasSubstr("Why evaluations failed is not shown: basin_Fail")));
+  for (const auto& [from, to] : {std::pair{"\"started\":", ",\"reportMade\""},
+                                 {"\"state\"", "\"notes\""},
+                                 {"\"parameters\"", "\"failures\""},
+                                 {"\"evaluations\":{", nullptr}}) {
+    const auto part = [from = from, to = to](const std::string& text) {
+      const auto begin = text.find(from);
+      return text.substr(begin, to == nullptr ? text.npos : text.find(to, begin) - begin);
+    };
+    EXPECT_EQ(part(again), part(data));
   }
 }
 

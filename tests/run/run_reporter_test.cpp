@@ -44,7 +44,7 @@ class RunReporterTest : public ::testing::Test {
   RunState state_;
   SearchSpace space_;
   ResultFile results_;
-  FailedRunFile failedRuns_{(folder_ / "calSimErr.dat"), "s", {"k"}};
+  FailedRunFile failedRuns_{{folder_ / "calSimErr.dat", folder_ / "s_Failures.dat"}, "s", {"k"}, {"Title"}};
   RunReporter reporter_{state_, results_, failedRuns_, space_};
 };
 
@@ -117,7 +117,10 @@ TEST_F(RunReporterTest, AnEvaluationReachesResultFileLogProgressAndTheFileOfFail
   EXPECT_THAT(folder_.read("s._spi_"), HasSubstr("PROGRE50.0\n"));
   EXPECT_THAT(folder_.read("calSimErr.dat"),
               HasSubstr("Evaluation No. 2 (batch ended with an exit code)\n   run.sh exited with code 3\n   k = 1\n"));
+  EXPECT_EQ(folder_.read("s_Failures.dat"),
+            "# Title\nEvaluation\tKind\tReason\tOutput\n2\texitCode\trun.sh exited with code 3\t\n");
   EXPECT_EQ(reporter_.failedCount(), 1);
+  EXPECT_EQ(reporter_.initial(), 1);
   EXPECT_EQ(state_.objectiveValues, std::vector<double>{kFailedRunValue});
 }
 

@@ -14,6 +14,7 @@
 #include <gtest/gtest.h>
 
 #include "platform/signals/signal_state.h"
+#include "run/results/run_record.h"
 #include "run/stop_run.h"
 #include "temporary_folder.h"
 
@@ -32,6 +33,7 @@ void actWithHandlers(const TemporaryFolder& folder, const char* buildMode, const
   signalState.runLogDescriptor = open("run.log");
   signalState.resultFileDescriptor = open("results");
   signalState.messageFileDescriptor = open("records");
+  signalState.runRecordDescriptor = open("record");
   setTerminationLogUnit(open("termination.log"));
   installSignalHandlers();
   act();
@@ -41,18 +43,25 @@ void actWithHandlers(const TemporaryFolder& folder, const char* buildMode, const
 const struct {
   int signal;
   const char* message;
+  RunStage stage;
 } kSignals[] = {
-    {SIGABRT, "Abnormal termination"},   {SIGILL, "Illegal instruction"},  {SIGINT, "Control-C send"},
-    {SIGSEGV, "Illegal storage access"}, {SIGTERM, "Termination request"}, {SIGHUP, "Termination request"},
-    {SIGBUS, "Illegal storage access"},  {SIGQUIT, "Termination request"}, {SIGXCPU, "Termination request"}};
+    {SIGABRT, "Abnormal termination", RunStage::failed},  {SIGILL, "Illegal instruction", RunStage::failed},
+    {SIGINT, "Control-C send", RunStage::cutOff},         {SIGSEGV, "Illegal storage access", RunStage::failed},
+    {SIGTERM, "Termination request", RunStage::cutOff},   {SIGHUP, "Termination request", RunStage::cutOff},
+    {SIGBUS, "Illegal storage access", RunStage::failed}, {SIGQUIT, "Termination request", RunStage::cutOff},
+    {SIGXCPU, "Termination request", RunStage::cutOff}};
 
 TEST(SignalHandlers, EverySignalEndsTheRunWithItsMessageInEveryPlace) {
-  for (const auto& [signal, message] : kSignals) {
+  for (const auto& [signal, message, stage] : kSignals) {
     const TemporaryFolder folder;
     EXPECT_EXIT(actWithHandlers(folder, "", "WIN", [signal = signal] { ::raise(signal); }),
                 ::testing::ExitedWithCode(128 + signal), fmt::format("^run_tests: {}\n$", message));
     EXPECT_EQ(folder.read("run.log"), fmt::format("\n{}\n", message));
     EXPECT_EQ(folder.read("results"), fmt::format("# {}\n", message));
+    const auto record = readRunRecord(runRecordText({}, {}) + folder.read("record"));
+    ASSERT_TRUE(record.has_value());
+    EXPECT_EQ(record->stage, stage);
+    EXPECT_EQ(record->message, message);
     EXPECT_EQ(folder.read("records"), fmt::format("STATUSEnded: {}\nPROGRE100.0\n", message));
     EXPECT_EQ(folder.read("termination.log"), std::string(message) + "\nAbnormal completion\n");
   }

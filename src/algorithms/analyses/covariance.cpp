@@ -10,6 +10,7 @@
 
 #include "algorithms/numbers/lapack.h"
 #include "algorithms/numbers/sample_summary.h"
+#include "common/run_files.h"
 
 namespace mirevo {
 
@@ -177,6 +178,50 @@ std::vector<ParameterLimits> parameterLimits(const ParameterCovariance& covarian
     }
   }
   return limits;
+}
+
+std::vector<DataTable> covarianceTables(const ParameterCovariance& covariance, const SearchSpace& space,
+                                        std::span<const double> set) {
+  if (covariance.degreesOfFreedom == 0) return {};
+  std::vector<std::string> names;
+  for (const std::size_t j : covariance.kept) names.push_back(space.names[j]);
+  std::vector<DataTable> tables;
+  tables.push_back(
+      matrixTable(run_files::kCovariance, "Covariance of the parameters, search scale", names, covariance.covariance));
+  tables.push_back(
+      matrixTable(run_files::kCorrelation, "Correlation of the parameters", names, covariance.correlation));
+  DataTable& limits = tables.emplace_back();
+  limits.name = tableName(run_files::kParameterLimits);
+  limits.headLines = {"Estimate, standard deviation and 95 % limits of each parameter, model scale"};
+  limits.columns = {"Parameter", "Estimate", "StandardDeviation", "Lower95", "Upper95", "LeftOut"};
+  const std::vector<ParameterLimits> found = parameterLimits(covariance, space, set);
+  for (std::size_t i = 0; i < names.size(); ++i) {
+    limits.rows.push_back(
+        {names[i], found[i].value, found[i].standardDeviation, found[i].lower, found[i].upper, std::string()});
+  }
+  for (const LeftOutParameter& parameter : covariance.leftOut) {
+    limits.rows.push_back({space.names[parameter.index], kNaN, kNaN, kNaN, kNaN, parameter.reason});
+  }
+  return tables;
+}
+
+DataTable jacobianTable(const LinearisedModel& model, const SearchSpace& space,
+                        std::span<const ObservationLabel> observations) {
+  DataTable table;
+  table.name = tableName(run_files::kJacobian);
+  table.headLines = {
+      "Derivatives of the simulated values by the parameters, search scale; the residual is the simulated "
+      "less the observed value, the weight that of its square"};
+  table.columns = {"Measure", "Time", "Weight", "Residual"};
+  table.columns.insert(table.columns.end(), space.names.begin(), space.names.end());
+  for (std::size_t i = 0; i < model.residuals.size(); ++i) {
+    if (!std::isfinite(model.residuals[i])) continue;
+    auto& row = table.rows.emplace_back();
+    row = {observations[i].measure, observations[i].time, model.weights.empty() ? 1.0 : model.weights[i],
+           model.residuals[i]};
+    for (const std::vector<double>& column : model.jacobian) row.emplace_back(column[i]);
+  }
+  return table;
 }
 
 std::vector<std::string> formatCovariance(const ParameterCovariance& covariance, const SearchSpace& space,

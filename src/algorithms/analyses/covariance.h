@@ -5,6 +5,7 @@
 #include <string>
 #include <vector>
 
+#include "common/data_table.h"
 #include "parameters/search_space.h"
 
 namespace mirevo {
@@ -51,6 +52,22 @@ struct ParameterLimits {
 /// One entry a kept parameter; `set` is the set at which the model was linearised, on the search scale.
 std::vector<ParameterLimits> parameterLimits(const ParameterCovariance& covariance, const SearchSpace& space,
                                              std::span<const double> set);
+
+/// The same for programs: covariance matrix (search scale), correlation matrix, limits of the parameters (model scale)
+/// with the reasons of those left out. None where there are not more observations than parameters.
+std::vector<DataTable> covarianceTables(const ParameterCovariance& covariance, const SearchSpace& space,
+                                        std::span<const double> set);
+
+/// Which observation a row of a linearised model is of.
+struct ObservationLabel {
+  std::string measure;
+  std::string time;
+};
+
+/// The linearised model for programs, one row per observation that counts: its weight in W, its residual and its
+/// derivatives on the search scale. `observations` has one entry per row of the model.
+DataTable jacobianTable(const LinearisedModel& model, const SearchSpace& space,
+                        std::span<const ObservationLabel> observations);
 
 /// The covariance analysis as lines of text for the log, with a warning for each |r| > 0.95.
 std::vector<std::string> formatCovariance(const ParameterCovariance& covariance, const SearchSpace& space,

@@ -8,6 +8,8 @@
 
 #include <fmt/format.h>
 
+#include "common/run_files.h"
+
 namespace mirevo {
 
 namespace {
@@ -231,6 +233,26 @@ std::optional<LinearisedModel> linearise(const PerturbationPlan& plan,
   model.weights = std::move(weights);
   model.jacobian = differenceColumns(plan, simulatedValues);
   return model;
+}
+
+std::vector<DataTable> sensitivityTables(const LocalSensitivity& sensitivity, const AnalysisNames& names) {
+  DataTable table;
+  table.name = tableName(run_files::kSensitivities);
+  table.headLines = {
+      "Derivatives on the search scale, and dimensionless: times the extent of the parameter, over the "
+      "size of the output; the composite is their root mean square over all outputs of a kind"};
+  table.columns = {"Parameter", "Kind", "Output", "Derivative", "Scaled", "Composite", "Problem"};
+  for (std::size_t j = 0; j < names.parameters.size(); ++j) {
+    const auto add = [&](const std::string& kind, const SensitivityTable& found, std::span<const std::string> outputs) {
+      for (std::size_t i = 0; i < outputs.size(); ++i) {
+        table.rows.push_back({names.parameters[j], kind, outputs[i], found.derivatives[j][i], found.scaled[j][i],
+                              found.composite[j], sensitivity.plan.differences[j].problem});
+      }
+    };
+    add("measure", sensitivity.measures, names.measures);
+    add("objective", sensitivity.objectives, names.objectives);
+  }
+  return {std::move(table)};
 }
 
 std::vector<std::string> formatSensitivity(const LocalSensitivity& sensitivity, const AnalysisNames& names) {

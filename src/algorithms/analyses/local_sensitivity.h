@@ -86,6 +86,10 @@ std::optional<LinearisedModel> linearise(const PerturbationPlan& plan,
                                          std::span<const std::vector<double>> simulatedValues,
                                          std::span<const double> observedValues, std::vector<double> weights);
 
+/// The same for programs: one row per parameter and output with derivative, scaled sensitivity, the parameter's
+/// composite over all outputs of that kind, and why there is none.
+std::vector<DataTable> sensitivityTables(const LocalSensitivity& sensitivity, const AnalysisNames& names);
+
 /// The analysis as lines of text for the log.
 std::vector<std::string> formatSensitivity(const LocalSensitivity& sensitivity, const AnalysisNames& names);
 

@@ -1,11 +1,14 @@
 #include "algorithms/analyses/uncertainty.h"
 
 #include <algorithm>
+#include <cstdint>
 #include <numeric>
+#include <utility>
 
 #include <fmt/format.h>
 
 #include "algorithms/numbers/uniform_generator.h"
+#include "common/run_files.h"
 
 namespace mirevo {
 
@@ -136,6 +139,31 @@ UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome) {
   summary.objectives = summariseColumns(
       successful.size(), [&](std::size_t i) -> auto& { return successful[i]->objectiveValues; });
   return summary;
+}
+
+std::vector<DataTable> uncertaintyTables(const UncertaintySummary& summary, const AnalysisNames& names) {
+  DataTable table;
+  table.name = tableName(run_files::kQuantiles);
+  table.headLines = {
+      "Parameters on the search scale, of all sets drawn; measures and objective functions of those whose "
+      "model run succeeded"};
+  table.columns = {"Kind", "Name", "Count", "Mean", "StandardDeviation"};
+  for (const double p : kSummaryProbabilities) table.columns.push_back(fmt::format("{:g} %", 100.0 * p));
+  const auto add = [&table](const std::string& kind, std::span<const std::string> ofKind,
+                            std::span<const SampleSummary> summaries) {
+    for (std::size_t i = 0; i < summaries.size(); ++i) {
+      const SampleSummary& one = summaries[i];
+      std::vector<DataTable::Cell>& row = table.rows.emplace_back();
+      row = {kind, ofKind[i], static_cast<std::int64_t>(one.count), one.mean, one.standardDeviation};
+      row.insert(row.end(), one.quantiles.begin(), one.quantiles.end());
+    }
+  };
+  add("parameter", names.parameters, summary.parameters);
+  add("measure", names.measures, summary.measures);
+  add("objective", names.objectives, summary.objectives);
+  return {std::move(table),
+          matrixTable(run_files::kSampleCorrelation, "Correlation of the parameters of all sets drawn",
+                      names.parameters, summary.correlations)};
 }
 
 std::vector<std::string> formatUncertainty(const UncertaintySummary& summary, const AnalysisNames& names) {

@@ -6,6 +6,7 @@
 
 #include "algorithms/numbers/sample_summary.h"
 #include "algorithms/numbers/special_functions.h"
+#include "common/data_table.h"
 #include "common/parameter_set.h"
 #include "common/settings/keyword_row.h"
 #include "evaluation/evaluator.h"
@@ -69,6 +70,10 @@ struct UncertaintySummary {
 };
 
 UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome);
+
+/// The same for programs: mean, standard deviation and quantiles of each parameter (search scale), measure and
+/// objective function; the correlation of the parameters of the sample.
+std::vector<DataTable> uncertaintyTables(const UncertaintySummary& summary, const AnalysisNames& names);
 
 /// The summary as lines of text for the log.
 std::vector<std::string> formatUncertainty(const UncertaintySummary& summary, const AnalysisNames& names);

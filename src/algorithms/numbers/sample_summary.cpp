@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cmath>
 #include <limits>
+#include <utility>
 
 #include <fmt/format.h>
 
@@ -79,6 +80,21 @@ std::vector<std::vector<double>> correlationMatrix(std::span<const std::vector<d
     for (std::size_t j = 0; j < i; ++j) matrix[i][j] = matrix[j][i] = sampleCorrelation(columns[i], columns[j]);
   }
   return matrix;
+}
+
+DataTable matrixTable(const RunFile& file, std::string headLine, std::span<const std::string> names,
+                      std::span<const std::vector<double>> matrix) {
+  DataTable table;
+  table.name = tableName(file);
+  table.headLines = {std::move(headLine)};
+  table.columns = {"Parameter"};
+  table.columns.insert(table.columns.end(), names.begin(), names.end());
+  for (std::size_t i = 0; i < matrix.size(); ++i) {
+    std::vector<DataTable::Cell>& row = table.rows.emplace_back();
+    row.emplace_back(names[i]);
+    row.insert(row.end(), matrix[i].begin(), matrix[i].end());
+  }
+  return table;
 }
 
 std::vector<std::string> formatTable(const std::string& corner, std::span<const std::string> headings,

@@ -5,6 +5,9 @@
 #include <string>
 #include <vector>
 
+#include "common/data_table.h"
+#include "common/run_files.h"
+
 namespace mirevo {
 
 /// The probabilities of the quantiles that summaries give.
@@ -29,6 +32,10 @@ double sampleCorrelation(std::span<const double> a, std::span<const double> b);
 
 /// The correlation matrix of the columns of `rows` (n rows of p values each), p x p, with 1 on the diagonal.
 std::vector<std::vector<double>> correlationMatrix(std::span<const std::vector<double>> rows);
+
+/// A square matrix of parameters, one row and one column each, as a table for programs; an empty one has no rows.
+DataTable matrixTable(const RunFile& file, std::string headLine, std::span<const std::string> names,
+                      std::span<const std::vector<double>> matrix);
 
 /// A table as lines of text: names to the left, then one right-aligned column a heading, with six significant digits.
 /// `rows[i]` stands behind `names[i]`.

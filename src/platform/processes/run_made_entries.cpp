@@ -9,6 +9,7 @@
 
 #include "common/descriptor.h"
 #include "common/files.h"
+#include "common/run_files.h"
 #include "common/take_text.h"
 #include "common/text.h"
 #include "platform/processes/process_folder.h"
@@ -18,43 +19,13 @@ namespace {
 
 constexpr std::string_view kSetupEnding = ".kdx";
 
-/// What follows a setup's name in the name of something that its runs make. What an earlier run made is kept with a
-/// number before the extension: `basin_Saved.2`, `basin_Optimisation.1.dat`. A run that was killed may have left one
-/// half-written, with kTemporaryEnding behind it.
-struct Ending {
-  std::string_view stem;
-  std::string_view extension;
-  bool isNumbered = false;   ///< a number follows the stem
-  bool mayBeModels = false;  ///< so plain a name that only the content tells
-};
-
-constexpr std::array<Ending, 18> kEndings = {{
-    {"", ".log", false, true},
-    {"", ".dat", false, true},
-    {"", "._spi_"},
-    {"", "._kill_"},
-    {"_Optimisation", ".dat"},
-    {"_Sensitivity", ".dat"},
-    {"_Series", ".dat"},
-    {"_Restart", ".dat"},
-    {"_Optimisation_Restart", ".dat"},
-    {"_Sensitivity_Restart", ".dat"},
-    {"_Simulated", ".bin"},
-    {"_Sensitivity_Simulated", ".bin"},
-    {"_Report", ".html"},
-    {"_Termination", ".log"},
-    {"_Band_", ".csv", true},
-    {"_Saved", ""},
-    {"_Failed", "", true},
-    {"_Process", "", true},
-}};
-constexpr Ending kFailedRuns{"calSimErr", ".dat"};  ///< stands beside a setup without its name
-
-bool matches(std::string_view text, const Ending& ending) {
+/// `text` is a name behind that of the setup. A run that was killed may have left a file half-written, with
+/// kTemporaryEnding behind it.
+bool matches(std::string_view text, const RunFile& file) {
   if (text.ends_with(kTemporaryEnding)) text.remove_suffix(kTemporaryEnding.size());
-  if (!takeText(text, ending.stem) || (ending.isNumbered && takeDigits(text).empty())) return false;
-  if (text == ending.extension) return true;
-  return takeText(text, ".") && !takeDigits(text).empty() && text == ending.extension;
+  if (!takeText(text, file.stem) || (file.isNumbered && takeDigits(text).empty())) return false;
+  if (text == file.extension) return true;
+  return takeText(text, ".") && !takeDigits(text).empty() && text == file.extension;
 }
 
 /// Whether the file names this program in one of its first lines, as every log and result file does.
@@ -72,7 +43,7 @@ bool namesThisProgram(const std::string& path) {
 
 /// Whether this is a process folder of a setup that lies elsewhere.
 bool isProcessFolder(const std::string& path) {
-  static constexpr std::string_view kMark = "_Process";
+  constexpr std::string_view kMark = run_files::kProcessFolder.stem;
   const auto mark = path.rfind(kMark);
   if (mark == std::string::npos) return false;
   std::string_view number = std::string_view(path).substr(mark + kMark.size());
@@ -91,7 +62,7 @@ RunMadeEntries::RunMadeEntries(std::string folder, std::span<const std::string> 
 }
 
 bool RunMadeEntries::contains(std::string_view name) const {
-  if (!setups_.empty() && matches(name, kFailedRuns)) return true;
+  if (!setups_.empty() && matches(name, run_files::kFailedRuns)) return true;
   const auto owns = [&](const std::string& setup) { return belongsToRunOf(setup, name); };
   return std::any_of(setups_.begin(), setups_.end(), owns) || isProcessFolder(folder_ + "/" + std::string(name));
 }
@@ -99,10 +70,11 @@ bool RunMadeEntries::contains(std::string_view name) const {
 bool RunMadeEntries::belongsToRunOf(std::string_view setup, std::string_view name) const {
   std::string_view rest = name;
   if (!takeText(rest, setup)) return false;
-  const auto* ending =
-      std::find_if(kEndings.begin(), kEndings.end(), [rest](const Ending& each) { return matches(rest, each); });
-  if (ending == kEndings.end()) return false;
-  return !ending->mayBeModels || namesThisProgram(folder_ + "/" + std::string(name));
+  const std::span<const RunFile> files = runFilesOfSetup();
+  const auto file =
+      std::find_if(files.begin(), files.end(), [rest](const RunFile& each) { return matches(rest, each); });
+  if (file == files.end()) return false;
+  return !file->mayBeModels || namesThisProgram(folder_ + "/" + std::string(name));
 }
 
 }  // namespace mirevo

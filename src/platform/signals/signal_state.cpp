@@ -22,10 +22,6 @@ void writeLineFromSignal(int descriptor, std::string_view text, std::string_view
   errno = savedError;
 }
 
-bool isEndingRequest(std::string_view message) noexcept {
-  return message == kInterrupted || message == kTerminationRequest;
-}
-
 EndingSignalsHeld::EndingSignalsHeld() {
   sigset_t held;
   ::sigemptyset(&held);

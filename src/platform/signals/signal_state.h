@@ -12,6 +12,7 @@ struct SignalState {
   std::atomic<int> terminationLogUnit{0};  ///< a descriptor; 0 or less: none
   std::atomic<int> runLogDescriptor{-1};
   std::atomic<int> resultFileDescriptor{-1};   ///< as long as rows are written; -1 from the closing lines on
+  std::atomic<int> runRecordDescriptor{-1};    ///< while the record of the run has no ending
   std::atomic<int> messageFileDescriptor{-1};  ///< of the progress records
   std::atomic<int> heldSteps{0};               ///< number of EndingSignalsHeld objects
   std::atomic<bool> isEnding{false};           ///< a handler has begun to end the run
@@ -31,12 +32,6 @@ void writeLineFromSignal(int descriptor, std::string_view text, std::string_view
 
 /// The signals that request the run's end; the others that are handled report a crash.
 inline constexpr std::array kEndingRequests{SIGINT, SIGTERM, SIGHUP, SIGQUIT, SIGXCPU};
-
-inline constexpr std::string_view kInterrupted = "Control-C send";
-inline constexpr std::string_view kTerminationRequest = "Termination request";
-
-/// Whether this message, the last of a run, says that a signal requested its end; else the run crashed.
-bool isEndingRequest(std::string_view message) noexcept;
 
 /// While such an object exists, signals that request the run's end wait, so that no step is interrupted half-way and no
 /// file is left incomplete. For the main thread; the objects may be nested.

@@ -11,6 +11,8 @@
 
 #include "common/descriptor_output.h"
 #include "common/progress_messages.h"
+#include "common/run_files.h"
+#include "common/text.h"
 #include "platform/signals/signal_state.h"
 
 namespace mirevo {
@@ -18,15 +20,13 @@ namespace {
 
 constexpr int kNowhere = -1;
 constexpr int kStandardOutput = 0;
-constexpr std::string_view kMessageFileEnding = "._spi_";
-constexpr std::string_view kKillFileEnding = "._kill_";
 constexpr std::size_t kSpeedWindow = 100;  ///< evaluations
 /// For a pipe or terminal to take a record. One that took none in that time is not waited for until it takes one again,
 /// so that a reader who has stopped reading does not slow the run.
 constexpr int kPatienceMilliseconds = 1000;
 
 std::string baseNameOf(std::string_view runFileName) {
-  for (const std::string_view ending : {".log", ".inp"}) {
+  for (const std::string_view ending : {run_files::kLog.extension, std::string_view(".inp")}) {
     if (!runFileName.ends_with(ending)) continue;
     runFileName.remove_suffix(ending.size());
     break;  // what is left may be called "basin.inp"
@@ -52,7 +52,7 @@ bool ProgressReporter::closeMessageFile() {
 std::string ProgressReporter::progressInit(std::string_view runFileName, std::string_view destination) {
   baseName_ = baseNameOf(runFileName);
   std::string problems;
-  const std::string killFile = baseName_ + std::string(kKillFileEnding);
+  const std::string killFile = runFilePath(baseName_, run_files::kKill);
   if (::unlink(killFile.c_str()) != 0 && errno != ENOENT) {
     problems = fmt::format("Unable to remove the kill file of an earlier run: {}: {}", killFile, std::strerror(errno));
   }
@@ -105,7 +105,7 @@ void ProgressReporter::giveUp(int error) {
 }
 
 std::string ProgressReporter::messageFile() const {
-  return baseName_ + std::string(kMessageFileEnding);
+  return runFilePath(baseName_, run_files::kMessages);
 }
 
 void ProgressReporter::writeStatus(std::string_view text) {
@@ -171,7 +171,7 @@ void ProgressReporter::progressEnd(std::string_view ending) {
 }
 
 bool ProgressReporter::isCancelled() {
-  if (!cancelled_) cancelled_ = ::access((baseName_ + std::string(kKillFileEnding)).c_str(), F_OK) == 0;
+  if (!cancelled_) cancelled_ = ::access(runFilePath(baseName_, run_files::kKill).c_str(), F_OK) == 0;
   return cancelled_;
 }
 

@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <filesystem>
-#include <optional>
 #include <system_error>
 #include <utility>
 
@@ -15,7 +14,6 @@
 namespace mirevo {
 namespace {
 
-constexpr std::string_view kHeading = "Evaluation No. ";
 constexpr std::string_view kIndent = "   ";
 
 std::string onOneLine(std::string text) {
@@ -23,83 +21,81 @@ std::string onOneLine(std::string text) {
   return text;
 }
 
-/// A record of the file, `text` without the blank line before it.
-struct FailureRecord {
-  int number = 0;
-  EvaluationFailure failure;
-  std::string_view text;
-};
-
-std::optional<FailureRecord> readRecord(std::string_view text) {
-  const std::vector<std::string_view> lines = splitLines(text);
-  if (lines.size() < 2 || !lines[0].starts_with(kHeading)) return std::nullopt;
-  const std::string_view heading = lines[0].substr(kHeading.size());
-  const std::size_t open = heading.find(" (");
-  const auto number = parseInteger(heading.substr(0, open));
-  if (!number || open == std::string_view::npos || !heading.ends_with(')')) return std::nullopt;
-  const auto kind = failureKindCalled(heading.substr(open + 2, heading.size() - open - 3));
-  if (!kind) return std::nullopt;
-  return FailureRecord{*number, {*kind, std::string(trim(lines[1])), {}}, text};
-}
-
-/// Every record of the file's text that can be read.
-std::vector<FailureRecord> readRecords(std::string_view text) {
-  std::vector<FailureRecord> records;
-  const std::string start = fmt::format("\n{}", kHeading);
-  std::size_t begin = text.find(start);
-  while (begin != std::string_view::npos) {
-    const std::size_t next = text.find(start, begin + 1);
-    const std::size_t length = next == std::string_view::npos ? std::string_view::npos : next - begin - 1;
-    if (auto record = readRecord(text.substr(begin + 1, length))) records.push_back(std::move(*record));
-    begin = next;
+/// Goes on behind `content`, which is in the file then.
+void continueWith(RecordFile& file, const std::string& path, const std::string& content) {
+  std::string reason;
+  if (readFileIfThere(path) != content && !replaceFile(path, content, reason)) {
+    fatalError("Error: Unable to write to " + path, reason);
   }
-  return records;
+  file.openToContinue(path);
 }
 
 }  // namespace
 
-FailedRunFile::FailedRunFile(std::string path, std::string setupName, std::vector<std::string> names)
-    : path_(std::move(path)), setupName_(std::move(setupName)), names_(std::move(names)) {}
+FailedRunFile::FailedRunFile(FailedRunPaths paths, std::string setupName, std::vector<std::string> names,
+                             std::vector<std::string> tableHead)
+    : paths_(std::move(paths)),
+      setupName_(std::move(setupName)),
+      names_(std::move(names)),
+      tableHead_(std::move(tableHead)) {}
 
 std::string FailedRunFile::headLine() const {
   return fmt::format("# Failed evaluations of {}\n", setupName_);
 }
 
-std::map<int, EvaluationFailure> FailedRunFile::takeUp(const std::set<int>& numbers) {
-  std::string reason;
-  const auto text = readFileIfThere(path_);
-  if (!text || !text->starts_with(headLine())) {
-    keepEarlierFile(path_);
-    return {};
-  }
+std::map<int, EvaluationFailure> FailedRunFile::takeUp(const std::map<int, std::vector<double>>& parameterValues) {
+  const auto text = readFileIfThere(paths_.table);
+  // Another setup in this folder may have written it since: it stands there without a setup's name.
+  const auto told = readFileIfThere(paths_.forPeople);
+  if (!text || (told && !told->starts_with(headLine()))) keepEarlierFile(paths_.forPeople);
+  if (!text) return {};
   std::map<int, EvaluationFailure> failures;
-  std::string kept = headLine();
-  for (FailureRecord& record : readRecords(*text)) {
-    if (numbers.count(record.number) == 0) continue;
-    if (failures.emplace(record.number, std::move(record.failure)).second) kept.append("\n").append(record.text);
+  std::string rows = failureTableHead(tableHead_);
+  std::string records = headLine();
+  for (const FailureRow& row : readFailureTable(*text)) {
+    const auto values = parameterValues.find(row.number);
+    if (values == parameterValues.end() || !failures.emplace(row.number, row.failure).second) continue;
+    rows += failureRowText(row);
+    records += record(values->second, row);
   }
-  if (!kept.ends_with('\n')) kept += '\n';
-  if (kept != *text && !replaceFile(path_, kept, reason)) fatalError("Error: Unable to write to " + path_, reason);
-  file_.openToContinue(path_);
+  continueWith(table_, paths_.table, rows);
+  continueWith(forPeople_, paths_.forPeople, records);
   return failures;
 }
 
 void FailedRunFile::add(std::span<const double> parameterValues, const EvaluationResult& result) {
-  std::string record;
-  if (!file_.isOpen()) {
-    file_.open(path_);
-    record = headLine();
+  const FailureRow row{result.number, *result.failure};
+  std::string text = record(parameterValues, row);
+  std::string line = failureRowText(row);
+  if (!forPeople_.isOpen()) {
+    forPeople_.open(paths_.forPeople);
+    text.insert(0, headLine());
   }
-  record += fmt::format("\n{}{} ({})\n{}{}\n", kHeading, result.number, failureKindName(result.failure->kind), kIndent,
-                        onOneLine(result.failure->reason));
+  if (!table_.isOpen()) {
+    table_.open(paths_.table);
+    line.insert(0, failureTableHead(tableHead_));
+  }
+  forPeople_.append(text);
+  table_.append(line);
+}
+
+void FailedRunFile::close() {
+  forPeople_.close();
+  table_.close();
+}
+
+std::string FailedRunFile::record(std::span<const double> parameterValues, const FailureRow& row) const {
+  const EvaluationFailure& failure = row.failure;
+  std::string text = fmt::format("\nEvaluation No. {} ({})\n{}{}\n", row.number, failureKindName(failure.kind), kIndent,
+                                 onOneLine(failure.reason));
   for (std::size_t i = 0; i < names_.size(); ++i) {
-    record += fmt::format("{}{} = {}\n", kIndent, names_[i], formatReal(parameterValues[i]));
+    text += fmt::format("{}{} = {}\n", kIndent, names_[i], formatReal(parameterValues[i]));
   }
-  if (!result.failure->lastOutput.empty()) {
-    record += fmt::format("{}Last output:\n", kIndent);
-    for (const std::string& line : result.failure->lastOutput) record += fmt::format("{}| {}\n", kIndent, line);
+  if (!failure.lastOutput.empty()) {
+    text += fmt::format("{}Last output:\n", kIndent);
+    for (const std::string& line : failure.lastOutput) text += fmt::format("{}| {}\n", kIndent, line);
   }
-  file_.append(record);
+  return text;
 }
 
 std::vector<std::string> removeFailedRunFolders(const std::string& prefix, const std::set<int>& numbers) {

@@ -11,16 +11,18 @@ namespace mirevo {
 /// Why the evaluations of a run failed, and how often for each reason.
 class FailureSummary final {
  public:
-  void add(int number, const EvaluationFailure& failure);
-  /// A line a kind of failure, the most frequent first, with the reason of the first evaluation that failed so.
-  std::vector<std::string> lines() const;
-
- private:
   struct Count {
     int count = 0;
     int firstNumber = 0;
     std::string firstReason;
   };
+
+  void add(int number, const EvaluationFailure& failure);
+  /// A line a kind of failure, the most frequent first, with the reason of the first evaluation that failed so.
+  std::vector<std::string> lines() const;
+  const std::map<EvaluationFailure::Kind, Count>& counts() const { return counts_; }
+
+ private:
   std::map<EvaluationFailure::Kind, Count> counts_;
 };
 

@@ -9,6 +9,7 @@
 
 #include "common/fatal_error.h"
 #include "common/files.h"
+#include "common/run_files.h"
 #include "run/results/restart_settings.h"
 
 namespace mirevo {
@@ -42,14 +43,14 @@ void requireSameSettings(const RestartSettings& then, const RestartSettings& now
 }
 
 /// In the order of their numbers, each number once.
-void putInOrder(std::vector<ResultTable::Row>& rows) {
+void putInOrder(std::vector<ResultRow>& rows) {
   std::stable_sort(rows.begin(), rows.end(), [](const auto& a, const auto& b) { return a.number < b.number; });
   rows.erase(std::unique(rows.begin(), rows.end(), [](const auto& a, const auto& b) { return a.number == b.number; }),
              rows.end());
 }
 
 /// The last evaluation before which none is missing.
-int lastWithoutGap(std::span<const ResultTable::Row> rows) {
+int lastWithoutGap(std::span<const ResultRow> rows) {
   int last = 0;
   while (last < std::ssize(rows) && rows[static_cast<std::size_t>(last)].number == last + 1) ++last;
   return last;
@@ -60,7 +61,7 @@ void raiseBudget(const Task& task, int earlierBudget, EarlierRun& run) {
   const auto raised = task.raisedBudget({earlierBudget, lastWithoutGap(run.rows), run.searches});
   if (!raised) return;
   if (!raised->refusal.empty()) refuse(raised->refusal);
-  const auto isObsolete = [&raised](const ResultTable::Row& row) { return row.number > raised->keptEvaluations; };
+  const auto isObsolete = [&raised](const ResultRow& row) { return row.number > raised->keptEvaluations; };
   run.rows.erase(std::remove_if(run.rows.begin(), run.rows.end(), isObsolete), run.rows.end());
   if (raised->earlier) run.searches.push_back(*raised->earlier);
   if (!raised->note.empty()) run.notes.push_back(raised->note);
@@ -68,43 +69,34 @@ void raiseBudget(const Task& task, int earlierBudget, EarlierRun& run) {
 
 /// The failed model runs behind which no evaluation succeeded: whatever stopped the run may be put right by now.
 void dropFailuresAtEnd(EarlierRun& run) {
-  const auto isOk = [](const ResultTable::Row& row) { return row.ok; };
+  const auto isOk = [](const ResultRow& row) { return row.ok; };
   const auto end = std::find_if(run.rows.rbegin(), run.rows.rend(), isOk).base();
   const auto count = std::distance(end, run.rows.end());
   run.rows.erase(end, run.rows.end());
   run.notes.push_back(fmt::format("Restart = 2: {} failed evaluations at the end are made again", count));
 }
 
-std::vector<std::string> historyOf(const ResultTable& table) {
-  std::vector<std::string> history;
-  for (const std::string& line : table.headLines) {
-    if (line.starts_with("Started: ") || line.starts_with("Restarted: ")) history.push_back(line);
-  }
-  return history;
-}
-
 }  // namespace
 
-RestartFiles restartFiles(const std::string& resultFile) {
-  const std::string stem = resultFile.substr(0, resultFile.rfind('.'));
-  return {resultFile, stem + "_Restart.dat", stem + "_Simulated.bin"};
+RestartFiles restartFiles(const std::string& filePrefix, const ResultFileNames& names) {
+  return {runFilePath(filePrefix, names.results), runFilePath(filePrefix, names.restart),
+          runFilePath(filePrefix, names.simulatedValues)};
 }
 
 std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunConfig& config,
-                                         const ResultColumns& columns) {
+                                         const ResultColumns& columns, std::optional<RunRecord> record) {
   const auto text = readFileIfThere(files.results);
-  ResultTable table = readResultTable(text.value_or(""));
+  ResultTable table = readResultTable(text.value_or(""), columns);
   // More than a beginning that was cut off: there may be days of work behind a header row that cannot be read.
-  if (!table.hasHeader() && table.unusableLines > 1) refuse(files.results + " has no header row that can be read");
-  if (table.rows.empty()) return std::nullopt;
+  if (!table.hasHeader && table.unusableLines > 1) refuse(files.results + " has no header row that can be read");
+  if (table.rows.empty() && table.rowsOfOtherColumns == 0) return std::nullopt;
   const RestartSettings then = readSettings(files.settings);
   const RestartSettings now = restartSettings(config);
   requireSameSettings(then, now);
-  const std::size_t expected =
-      columns.parameters.size() + columns.measures.size() + columns.objectives.size() + 1;  // the aggregate
-  if (table.columns.size() != expected) refuse(files.results + " has other columns than the setup asks for");
+  if (!table.hasExpectedColumns) refuse(files.results + " has other columns than the setup asks for");
 
-  EarlierRun run{std::move(table.rows), historyOf(table), then.searches, {}};
+  if (!record) record = recordOfEarlierVersion(table);
+  EarlierRun run{std::move(table.rows), std::move(record->started), std::move(record->restarted), then.searches, {}};
   putInOrder(run.rows);
   if (table.unusableLines > 0) {
     run.notes.push_back(
@@ -117,26 +109,19 @@ std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunCon
 }
 
 std::map<int, EarlierEvaluations::Record> earlierRecords(
-    EarlierRun& run, const ResultColumns& columns, const std::map<int, EvaluationFailure>& failures,
+    EarlierRun& run, const std::map<int, EvaluationFailure>& failures,
     std::optional<std::map<int, std::vector<double>>> simulatedValues) {
   if (simulatedValues) {
-    const auto isIncomplete = [&](const ResultTable::Row& row) {
-      return row.ok && simulatedValues->count(row.number) == 0;
-    };
+    const auto isIncomplete = [&](const ResultRow& row) { return row.ok && simulatedValues->count(row.number) == 0; };
     run.rows.erase(std::remove_if(run.rows.begin(), run.rows.end(), isIncomplete), run.rows.end());
   }
   std::map<int, EarlierEvaluations::Record> records;
-  for (const ResultTable::Row& row : run.rows) {
+  for (const ResultRow& row : run.rows) {
     EarlierEvaluations::Record& record = records[row.number];
-    auto next = row.values.begin();
-    const auto take = [&next](std::size_t count) {
-      const auto first = std::exchange(next, next + static_cast<std::ptrdiff_t>(count));
-      return std::vector<double>(first, next);
-    };
-    record.parameterValues = take(columns.parameters.size());
+    record.parameterValues = row.parameters;
     record.result.number = row.number;
-    record.result.measureValues = take(columns.measures.size());
-    record.result.objectiveValues = take(columns.objectives.size());
+    record.result.measureValues = row.measures;
+    record.result.objectiveValues = row.objectives;
     if (!row.ok) {
       const auto failure = failures.find(row.number);
       record.result.failure =

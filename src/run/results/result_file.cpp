@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <iterator>
+#include <optional>
 #include <utility>
 
 #include <fmt/format.h>
@@ -26,40 +27,22 @@ std::string commentLines(std::span<const std::string> texts) {
   return lines;
 }
 
-std::string rowStart(int number, bool ok) {
-  return fmt::format("{}\t{}", number, ok ? "OK" : "FAILED");
-}
-
-void addColumns(std::string& row, std::span<const double> values) {
-  for (const double value : values) {
-    row += '\t';
-    row += formatReal(value);
-  }
-}
-
 }  // namespace
 
 void ResultFile::open(const std::string& path, std::span<const std::string> headLines, const ResultColumns& columns,
-                      std::span<const ResultTable::Row> earlierRows) {
+                      std::span<const ResultRow> earlierRows) {
   rows_.clear();
   aggregates_.clear();
-  std::string head = commentLines(headLines);
-  head += "Evaluation\tStatus";
-  for (const auto* names : {&columns.parameters, &columns.measures, &columns.objectives}) {
-    for (const std::string& name : *names) head += '\t' + columnName(name);
-  }
-  head += "\tAggregate\n";
-  headLength_ = std::ssize(head);
+  columns_ = columns;
+  std::string content = commentLines(headLines) + resultHeader(columns) + '\n';
+  headLength_ = std::ssize(content);
   if (earlierRows.empty()) {
     file_.open(path);
-    file_.append(head);
+    file_.append(content);
     return;
   }
-  std::string content = std::move(head);
-  for (const ResultTable::Row& row : earlierRows) {
-    std::string line = rowStart(row.number, row.ok);
-    addColumns(line, row.values);
-    line += '\n';
+  for (const ResultRow& row : earlierRows) {
+    const std::string line = resultRowText(row) + '\n';
     rows_.push_back({row.number, std::ssize(content), std::ssize(line)});
     content += line;
   }
@@ -68,20 +51,15 @@ void ResultFile::open(const std::string& path, std::span<const std::string> head
   file_.openToContinue(path);
 }
 
-void ResultFile::addRow(std::span<const double> parameterValues, const EvaluationResult& result) {
-  std::string row = rowStart(result.number, result.ok());
-  addColumns(row, parameterValues);
-  addColumns(row, result.measureValues);
-  addColumns(row, result.objectiveValues);
-  addColumns(row, std::span(&result.aggregate, 1));
-  row += '\n';
+void ResultFile::addRow(const ResultRow& row) {
+  const std::string line = resultRowText(row) + '\n';
   const std::int64_t offset = file_.size();
-  file_.append(row);
-  rows_.push_back({result.number, offset, static_cast<std::int64_t>(row.size())});
+  file_.append(line);
+  rows_.push_back({row.number, offset, std::ssize(line)});
 }
 
 bool ResultFile::isInOrder() const {
-  return std::is_sorted(rows_.begin(), rows_.end(), [](const Row& a, const Row& b) { return a.number < b.number; });
+  return std::is_sorted(rows_.begin(), rows_.end(), [](const Place& a, const Place& b) { return a.number < b.number; });
 }
 
 bool ResultFile::finish(std::span<const std::string> closingLines, std::string& reason) {
@@ -99,15 +77,14 @@ bool ResultFile::finish(std::span<const std::string> closingLines, std::string& 
   return finished;
 }
 
-void ResultFile::appendRow(std::string& text, std::string_view content, const Row& row) const {
-  std::string_view line = content.substr(static_cast<std::size_t>(row.offset), static_cast<std::size_t>(row.length));
-  const auto aggregate = aggregates_.find(row.number);
-  if (aggregate == aggregates_.end()) {
-    text += line;
-  } else {
-    text += line.substr(0, line.rfind('\t') + 1);
-    text += formatReal(aggregate->second) + '\n';
-  }
+void ResultFile::appendRow(std::string& text, std::string_view content, const Place& place) const {
+  const auto length = static_cast<std::size_t>(place.length) - 1;  // without the line end
+  const std::string_view line = content.substr(static_cast<std::size_t>(place.offset), length);
+  const auto aggregate = aggregates_.find(place.number);
+  auto row = aggregate == aggregates_.end() ? std::nullopt : readResultRow(line, columns_);
+  if (row) row->aggregate = aggregate->second;
+  text += row ? resultRowText(*row) : line;
+  text += '\n';
 }
 
 bool ResultFile::rewriteInOrder(std::string_view closing, std::string& reason) const {
@@ -117,12 +94,12 @@ bool ResultFile::rewriteInOrder(std::string_view closing, std::string& reason) c
     reason = "it was shortened by another program";
     return false;
   }
-  std::vector<Row> ordered = rows_;
-  std::stable_sort(ordered.begin(), ordered.end(), [](const Row& a, const Row& b) { return a.number < b.number; });
+  std::vector<Place> ordered = rows_;
+  std::stable_sort(ordered.begin(), ordered.end(), [](const Place& a, const Place& b) { return a.number < b.number; });
   std::string sorted;
   sorted.reserve(content->size() + closing.size());
   sorted.append(*content, 0, static_cast<std::size_t>(headLength_));
-  for (const Row& row : ordered) appendRow(sorted, *content, row);
+  for (const Place& place : ordered) appendRow(sorted, *content, place);
   sorted += closing;
   return replaceFile(path(), sorted, reason);
 }

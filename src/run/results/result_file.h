@@ -7,18 +7,10 @@
 #include <string_view>
 #include <vector>
 
-#include "evaluation/evaluation_result.h"
 #include "run/results/record_file.h"
-#include "run/results/result_table.h"
+#include "run/results/result_row.h"
 
 namespace mirevo {
-
-/// The names over the columns of a result file.
-struct ResultColumns {
-  std::vector<std::string> parameters;  ///< variable parameters
-  std::vector<std::string> measures;
-  std::vector<std::string> objectives;
-};
 
 /// The table of a run's evaluations: `#` head lines, a header row, a row an evaluation, `#` closing lines. Rows are
 /// written as evaluations arrive, so that a killed run leaves every finished one on disk; a file that ends orderly
@@ -28,10 +20,10 @@ class ResultFile final {
   /// Creates the file with its head lines (without "# "), its header row and the rows of an earlier run, which is then
   /// in the place of the earlier file: there is no moment at which a row is nowhere. Throws FatalError.
   void open(const std::string& path, std::span<const std::string> headLines, const ResultColumns& columns,
-            std::span<const ResultTable::Row> earlierRows = {});
+            std::span<const ResultRow> earlierRows = {});
 
-  /// One evaluation: `parameterValues` on the model scale, one a column. Throws FatalError when it cannot be written.
-  void addRow(std::span<const double> parameterValues, const EvaluationResult& result);
+  /// One evaluation. Throws FatalError when it cannot be written.
+  void addRow(const ResultRow& row);
 
   /// Gives a row another aggregate than it was written with; takes effect on disk with finish().
   void replaceAggregate(int number, double aggregate) { aggregates_[number] = aggregate; }
@@ -47,18 +39,20 @@ class ResultFile final {
   int descriptor() const { return file_.descriptor(); }
 
  private:
-  struct Row {
+  /// Where a row stands in the file.
+  struct Place {
     int number;
     std::int64_t offset;
     std::int64_t length;
   };
   bool isInOrder() const;
-  void appendRow(std::string& text, std::string_view content, const Row& row) const;
+  void appendRow(std::string& text, std::string_view content, const Place& place) const;
   bool rewriteInOrder(std::string_view closing, std::string& reason) const;
 
   RecordFile file_;
+  ResultColumns columns_;
   std::int64_t headLength_ = 0;
-  std::vector<Row> rows_;
+  std::vector<Place> rows_;
   std::map<int, double> aggregates_;  ///< by row number
 };
 

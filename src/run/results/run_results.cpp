@@ -1,32 +1,45 @@
 #include "run/results/run_results.h"
 
-#include <filesystem>
 #include <set>
 #include <utility>
 
 #include <fmt/format.h>
 
 #include "common/clock.h"
+#include "common/fatal_error.h"
+#include "common/files.h"
+#include "common/run_files.h"
+#include "common/text.h"
 #include "common/version.h"
 #include "run/results/record_file.h"
+#include "run/results/run_record.h"
 
 namespace mirevo {
 namespace {
 
-ResultColumns resultColumns(const RunConfig& config, const SearchSpace& space) {
-  ResultColumns columns;
-  columns.parameters = space.names;
-  for (const OutputMeasure& measure : config.measures) columns.measures.push_back(measure.name);
-  for (const ObjectiveFunction& objective : config.objectives) columns.objectives.push_back(objective.name);
-  return columns;
+/// The head of the result file.
+std::vector<std::string> headLines(const RunConfig& config, const RunRecord& record) {
+  std::vector<std::string> lines{config.title, fmt::format("Mirevo {}", programVersion()), config.taskDescription()};
+  if (record.seed) lines.push_back(fmt::format("Random seed: {}", *record.seed));
+  lines.push_back("Setup file: " + config.setupFile);
+  if (!record.started.empty()) lines.push_back("Started: " + record.started);
+  for (const std::string& time : record.restarted) lines.push_back("Restarted: " + time);
+  return lines;
 }
 
-/// The head of the result file but for when the run was started.
-std::vector<std::string> headLines(const RunConfig& config) {
-  std::vector<std::string> lines{config.title, fmt::format("Mirevo {}", programVersion()), config.taskDescription()};
-  if (config.drawsRandomNumbers()) lines.push_back(fmt::format("Random seed: {}", config.task->randomSeed));
-  lines.push_back("Setup file: " + config.setupFile);
-  return lines;
+/// Over a table that is for programs.
+std::vector<std::string> tableHeadLines(const RunConfig& config) {
+  return {columnName(config.title), fmt::format("Mirevo {}", programVersion()), "Setup file: " + config.setupFile};
+}
+
+/// What is known of a run when it begins.
+RunRecord recordOf(const RunConfig& config) {
+  RunRecord record;
+  if (config.task) record.task = config.task->facts().name.name;
+  record.program = programVersion();
+  record.plannedEvaluations = config.plannedModelRuns();
+  if (config.drawsRandomNumbers()) record.seed = config.task->randomSeed;
+  return record;
 }
 
 }  // namespace
@@ -34,13 +47,16 @@ std::vector<std::string> headLines(const RunConfig& config) {
 RunResults::RunResults(const RunConfig& config, const SearchSpace& space, const std::string& filePrefix)
     : space_(space),
       filePrefix_(filePrefix),
+      tableHead_(tableHeadLines(config)),
       columns_(resultColumns(config, space)),
-      failedRuns_(std::filesystem::path(filePrefix).replace_filename(kFailedRunFileName).string(), config.setupName,
-                  space.names) {
-  const std::string_view ending = config.resultFileEnding();
-  if (ending.empty()) return;
-  files_ = restartFiles(filePrefix + std::string(ending));
-  if (config.restart != RestartMode::startAfresh) earlierRun_ = findEarlierRun(*files_, config, columns_);
+      failedRuns_({failedRunsPath(filePrefix), runFilePath(filePrefix, run_files::kFailures)}, config.setupName,
+                  space.names, tableHead_),
+      record_(runFilePath(filePrefix, run_files::kRecord), tableHead_) {
+  if (!config.task) return;
+  files_ = restartFiles(filePrefix, config.task->facts().resultFiles);
+  if (config.restart != RestartMode::startAfresh) {
+    earlierRun_ = findEarlierRun(*files_, config, columns_, record_.readEarlier());
+  }
 }
 
 std::vector<EarlierSearch> RunResults::earlierSearches() const {
@@ -69,42 +85,69 @@ void RunResults::close() {
   if (simulatedValues_) simulatedValues_->close();
 }
 
-void RunResults::beginAnew(const RunConfig& config, RunLog& log) {
-  keepEarlierFile(failedRuns_.path());
+void RunResults::writeTables(std::span<const DataTable> tables) const {
+  for (const DataTable& found : tables) {
+    DataTable table = found;
+    table.headLines.insert(table.headLines.begin(), tableHead_.begin(), tableHead_.end());
+    const std::string path = dataTablePath(filePrefix_, table.name);
+    const std::string text = dataTableText(table);
+    std::string reason;
+    if (readTextFile(path, reason) == text) continue;  // of a run that is walked through again
+    keepEarlierFile(path);
+    if (!replaceFile(path, text, reason)) fatalError("Error: Unable to write to " + path, reason);
+  }
+}
+
+void RunResults::keepEarlierFiles(const RunConfig& config, RunLog& log) const {
+  keepEarlierFile(failedRuns_.paths().forPeople);
   if (const std::string kept = keepEarlierFile(files_->results); !kept.empty()) {
     log.line("The results of the earlier run were kept as " + kept);
   }
-  keepEarlierFile(files_->settings);
-  keepEarlierFile(files_->simulatedValues);
-  if (const std::string kept = keepEarlierFile(filePrefix_ + "_Saved"); !kept.empty()) {
+  for (const std::string& path :
+       {files_->settings, files_->simulatedValues, record_.path(), failedRuns_.paths().table}) {
+    keepEarlierFile(path);
+  }
+  for (const RunFile& table : run_files::kAnalysisTables) keepEarlierFile(runFilePath(filePrefix_, table));
+  if (const std::string kept = keepEarlierFile(runFilePath(filePrefix_, run_files::kSavedFolder)); !kept.empty()) {
     log.line("The saved output files of the earlier run were kept as " + kept);
   }
-  for (const std::string& problem : removeFailedRunFolders(processFolderPrefix(config) + "_Failed", {}))
-    log.warning(problem);
+  const std::string failedFolders = runFilePath(processFolderPrefix(config), run_files::kFailedFolder);
+  for (const std::string& problem : removeFailedRunFolders(failedFolders, {})) log.warning(problem);
+}
+
+void RunResults::beginAnew(const RunConfig& config, RunLog& log) {
+  keepEarlierFiles(config, log);
   // Before there is a result, so that none is ever without the settings that it depends on.
   writeRestartSettings(files_->settings, config);
   if (simulatedValues_) simulatedValues_->create();
-  std::vector<std::string> head = headLines(config);
-  head.push_back("Started: " + dateAndTimeNow());
-  table_.open(files_->results, head, columns_);
+  RunRecord record = recordOf(config);
+  record.started = dateAndTimeNow();
+  record_.begin(record);
+  table_.open(files_->results, headLines(config, record), columns_);
 }
 
 void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggregator, RunLog& log) {
   EarlierRun run = *std::exchange(earlierRun_, std::nullopt);
-  std::set<int> failed;
+  std::map<int, std::vector<double>> failed;
+  std::set<int> failedNumbers;
   std::set<int> succeeded;
-  for (const ResultTable::Row& row : run.rows) (row.ok ? succeeded : failed).insert(row.number);
+  for (const ResultRow& row : run.rows) {
+    (row.ok ? succeeded : failedNumbers).insert(row.number);
+    if (!row.ok) failed[row.number] = row.parameters;
+  }
   const std::map<int, EvaluationFailure> failures = failedRuns_.takeUp(failed);
-  for (const std::string& problem : removeFailedRunFolders(processFolderPrefix(config) + "_Failed", failed))
-    log.warning(problem);
+  const std::string failedFolders = runFilePath(processFolderPrefix(config), run_files::kFailedFolder);
+  for (const std::string& problem : removeFailedRunFolders(failedFolders, failedNumbers)) log.warning(problem);
   std::optional<std::map<int, std::vector<double>>> values;
   if (simulatedValues_) values = simulatedValues_->takeUp(succeeded);
-  auto records = earlierRecords(run, columns_, failures, std::move(values));
+  auto records = earlierRecords(run, failures, std::move(values));
 
-  std::vector<std::string> head = headLines(config);
-  head.insert(head.end(), run.history.begin(), run.history.end());
-  head.push_back("Restarted: " + dateAndTimeNow());
-  table_.open(files_->results, head, columns_, run.rows);
+  RunRecord record = recordOf(config);
+  record.started = run.started;
+  record.restarted = run.restarted;
+  record.restarted.push_back(dateAndTimeNow());
+  record_.begin(record);
+  table_.open(files_->results, headLines(config, record), columns_, run.rows);
   // Only now: with a raised budget in it, rows that the smaller one had ended would be taken for the search's.
   writeRestartSettings(files_->settings, config);
   for (const std::string& note : run.notes) log.line(note);

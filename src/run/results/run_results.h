@@ -6,6 +6,7 @@
 #include <string>
 #include <vector>
 
+#include "common/data_table.h"
 #include "evaluation/earlier_evaluations.h"
 #include "measures/objective_functions.h"
 #include "measures/observed_series.h"
@@ -14,6 +15,7 @@
 #include "run/results/failed_run_file.h"
 #include "run/results/restart.h"
 #include "run/results/result_file.h"
+#include "run/results/run_record_file.h"
 #include "run/results/simulated_values_file.h"
 #include "run/setup/run_config.h"
 
@@ -39,8 +41,13 @@ class RunResults final {
   /// Closes what stands beside the table. Throws FatalError when what was written did not all arrive.
   void close();
 
+  /// Writes what the task found, each table as `<setup>_<name>.dat`; an earlier one with other content is kept under a
+  /// numbered name. Throws FatalError.
+  void writeTables(std::span<const DataTable> tables) const;
+
   ResultFile& table() { return table_; }
   FailedRunFile& failedRuns() { return failedRuns_; }
+  RunRecordFile& record() { return record_; }
   /// nullptr where the task does not work with simulated values.
   SimulatedValuesFile* simulatedValues() { return simulatedValues_ ? &*simulatedValues_ : nullptr; }
   /// nullptr where there is no earlier run to go on from.
@@ -48,15 +55,18 @@ class RunResults final {
 
  private:
   void beginAnew(const RunConfig& config, RunLog& log);
+  void keepEarlierFiles(const RunConfig& config, RunLog& log) const;
   void goOn(const RunConfig& config, const ObjectiveAggregator& aggregator, RunLog& log);
 
   SearchSpace space_;
   std::string filePrefix_;
+  std::vector<std::string> tableHead_;  ///< over every table that is for programs
   ResultColumns columns_;
   std::optional<RestartFiles> files_;  ///< nothing for a task without results
   std::optional<EarlierRun> earlierRun_;
   ResultFile table_;
   FailedRunFile failedRuns_;
+  RunRecordFile record_;
   std::optional<SimulatedValuesFile> simulatedValues_;
   std::optional<EarlierEvaluations> earlierEvaluations_;
 };

@@ -32,7 +32,11 @@ bool isSame(std::span<const double> a, std::span<const double> b) {
 
 SeriesRecorder::SeriesRecorder(std::string path, RecordedSeries run, std::function<double()> clock,
                                std::function<void(std::string_view)> warn)
-    : path_(std::move(path)), run_(std::move(run)), clock_(std::move(clock)), warn_(std::move(warn)) {}
+    : path_(std::move(path)),
+      run_(std::move(run)),
+      clock_(std::move(clock)),
+      warn_(std::move(warn)),
+      initialChoice_(run_.initialValues) {}
 
 void SeriesRecorder::resume(std::string_view earlierFile) {
   const SeriesTable table = readSeriesTable(earlierFile);
@@ -49,15 +53,15 @@ void SeriesRecorder::resume(std::string_view earlierFile) {
     return held;
   };
   initial_ = takeOver(table.initial, &ShownSeries::initial);
-  isOfInitialParameters_ = table.isOfInitialParameters;
+  if (initial_) initialChoice_.resume(initial_->evaluation.number, table.isOfInitialParameters);
   best_ = takeOver(table.best, &ShownSeries::best);
   isChanged_ = initial_.has_value();
 }
 
 void SeriesRecorder::evaluationFinished(const EvaluationResult& result, std::span<const double> values,
-                                        bool hasInitialParameters, const std::optional<BestEvaluation>& best) {
+                                        const std::optional<BestEvaluation>& best) {
   if (!result.shownSeries.empty()) {
-    holdInitial(result, hasInitialParameters);
+    holdInitial(result, values);
     if (std::isnan(result.aggregate)) {
       holdUnsettled(result, values);
     } else if (best && (best->number == result.number || isSame(best->parameterValues, values))) {
@@ -69,13 +73,9 @@ void SeriesRecorder::evaluationFinished(const EvaluationResult& result, std::spa
   if (isChanged_ && clock_() >= nextWrite_) write();
 }
 
-void SeriesRecorder::holdInitial(const EvaluationResult& result, bool hasInitialParameters) {
-  const bool isBetterChoice =
-      !initial_ || (hasInitialParameters && !isOfInitialParameters_) ||
-      (hasInitialParameters == isOfInitialParameters_ && result.number < initial_->evaluation.number);
-  if (!isBetterChoice) return;
+void SeriesRecorder::holdInitial(const EvaluationResult& result, std::span<const double> values) {
+  if (!initialChoice_.consider(result.number, values)) return;
   initial_ = Held{{result.number, result.aggregate}, {}, result.shownSeries};
-  isOfInitialParameters_ = hasInitialParameters;
   isChanged_ = true;
 }
 
@@ -129,7 +129,7 @@ void SeriesRecorder::write() {
   SeriesTable table;
   table.headLines = run_.headLines;
   if (initial_) table.initial = initial_->evaluation;
-  table.isOfInitialParameters = isOfInitialParameters_;
+  table.isOfInitialParameters = initialChoice_.hasSetupValues();
   if (best_) table.best = best_->evaluation;
   for (std::size_t i = 0; i < run_.measures.size(); ++i) table.series.push_back(shownSeries(i));
   std::string reason;

@@ -8,9 +8,9 @@
 #include <string_view>
 #include <vector>
 
+#include "evaluation/chosen_evaluations.h"
 #include "evaluation/evaluation_result.h"
 #include "measures/period_series.h"
-#include "run/results/best_evaluation.h"
 #include "run/results/series_table.h"
 
 namespace mirevo {
@@ -22,6 +22,7 @@ struct RecordedSeries {
   std::vector<PeriodSeries> observations;  ///< with the times around the period's ends
   std::int64_t periodFirst = 0;            ///< secondNumber() of the period's ends
   std::int64_t periodLast = 0;
+  std::vector<double> initialValues;  ///< the setup's, of the variable parameters, model scale
 };
 
 /// Keeps `<setup>_Series.dat`: the simulated series of the initial and of the best evaluation so far. The file is
@@ -36,7 +37,7 @@ class SeriesRecorder final {
   void resume(std::string_view earlierFile);
 
   /// An evaluation has finished; `values` on the model scale. `best` is the run's best one, this one considered.
-  void evaluationFinished(const EvaluationResult& result, std::span<const double> values, bool hasInitialParameters,
+  void evaluationFinished(const EvaluationResult& result, std::span<const double> values,
                           const std::optional<BestEvaluation>& best);
 
   /// The aggregate of an evaluation that was not known when it finished.
@@ -52,7 +53,7 @@ class SeriesRecorder final {
     std::vector<double> values;
     std::vector<PeriodSeries> series;
   };
-  void holdInitial(const EvaluationResult& result, bool hasInitialParameters);
+  void holdInitial(const EvaluationResult& result, std::span<const double> values);
   void holdUnsettled(const EvaluationResult& result, std::span<const double> values);
   void follow(const std::optional<BestEvaluation>& best, const Held* finished);
   void write();
@@ -64,7 +65,7 @@ class SeriesRecorder final {
   std::function<double()> clock_;
   std::function<void(std::string_view)> warn_;
   std::optional<Held> initial_;
-  bool isOfInitialParameters_ = false;
+  InitialChoice initialChoice_;  ///< among the evaluations whose series are there
   std::optional<Held> best_;
   std::map<int, Held> unsettled_;  ///< evaluations whose aggregate comes later, by number
   std::size_t unsettledSteps_ = 0;

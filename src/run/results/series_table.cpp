@@ -1,5 +1,6 @@
 #include "run/results/series_table.h"
 
+#include <algorithm>
 #include <array>
 #include <charconv>
 #include <cmath>
@@ -8,17 +9,38 @@
 #include <fmt/format.h>
 
 #include "common/calendar.h"
+#include "common/data_table.h"
 #include "common/text.h"
+#include "run/results/result_row.h"
 
 namespace mirevo {
 namespace {
 
 constexpr std::string_view kHeader = "Measure\tTime\tObserved\tInitial\tBest";
+
+/// The head lines that say which evaluations are shown: "Initial: evaluation 2, the first that succeeded, aggregate
+/// 0.1". They are written and read by the same constants. Files of earlier versions hold these, which a restart reads:
+/// where a line is to read otherwise, reading must still know these.
+namespace head {
 constexpr std::string_view kInitial = "Initial: evaluation ";
 constexpr std::string_view kBest = "Best: evaluation ";
 constexpr std::string_view kOfSetup = ", with the initial parameters";
 constexpr std::string_view kOfFirst = ", the first that succeeded";
 constexpr std::string_view kAggregate = ", aggregate ";
+
+std::string line(std::string_view which, const ShownEvaluation& evaluation, std::string_view origin) {
+  return fmt::format("# {}{}{}{}{}\n", which, evaluation.number, origin, kAggregate, formatReal(evaluation.aggregate));
+}
+
+/// What stands behind `which`: "2, the first that succeeded, aggregate 0.1".
+std::optional<ShownEvaluation> read(std::string_view text) {
+  const std::size_t aggregate = text.rfind(kAggregate);
+  const auto number = parseInteger(text.substr(0, text.find(',')));
+  if (!number || aggregate == std::string_view::npos) return std::nullopt;
+  const auto value = realCell(text.substr(aggregate + kAggregate.size()));
+  return ShownEvaluation{*number, value.value_or(std::numeric_limits<double>::quiet_NaN())};
+}
+}  // namespace head
 
 void appendCell(std::string& text, float value) {
   text += '\t';
@@ -54,21 +76,12 @@ std::optional<float> readCell(std::string_view text) {
   return value;
 }
 
-/// What stands behind the words that introduce an evaluation: "17, aggregate 0.5".
-std::optional<ShownEvaluation> readEvaluation(std::string_view text) {
-  const std::size_t aggregate = text.rfind(kAggregate);
-  const auto number = parseInteger(text.substr(0, text.find(',')));
-  if (!number || aggregate == std::string_view::npos) return std::nullopt;
-  const auto value = parseReal(text.substr(aggregate + kAggregate.size()));
-  return ShownEvaluation{*number, value.value_or(std::numeric_limits<double>::quiet_NaN())};
-}
-
 void readHeadLine(std::string_view line, SeriesTable& table) {
-  if (line.starts_with(kInitial)) {
-    table.initial = readEvaluation(line.substr(kInitial.size()));
-    table.isOfInitialParameters = line.find(kOfSetup) != std::string_view::npos;
-  } else if (line.starts_with(kBest)) {
-    table.best = readEvaluation(line.substr(kBest.size()));
+  if (line.starts_with(head::kInitial)) {
+    table.initial = head::read(line.substr(head::kInitial.size()));
+    table.isOfInitialParameters = line.find(head::kOfSetup) != std::string_view::npos;
+  } else if (line.starts_with(head::kBest)) {
+    table.best = head::read(line.substr(head::kBest.size()));
   } else {
     table.headLines.emplace_back(line);
   }
@@ -95,17 +108,23 @@ void readRow(std::string_view line, SeriesTable& table) {
 
 }  // namespace
 
+std::vector<std::string> seriesNames(std::span<const OutputMeasure> measures, std::span<const std::size_t> shown) {
+  std::vector<std::string> names;
+  for (const std::size_t i : shown) {
+    std::string name = columnName(measures[i].name);
+    if (std::count(names.begin(), names.end(), name) > 0) name += fmt::format(" (measure {})", i + 1);
+    names.push_back(std::move(name));
+  }
+  return names;
+}
+
 std::string seriesTableText(const SeriesTable& table) {
   std::string text;
   for (const std::string& line : table.headLines) text += fmt::format("# {}\n", line);
   if (table.initial) {
-    text += fmt::format("# {}{}{}{}{}\n", kInitial, table.initial->number,
-                        table.isOfInitialParameters ? kOfSetup : kOfFirst, kAggregate,
-                        formatReal(table.initial->aggregate));
+    text += head::line(head::kInitial, *table.initial, table.isOfInitialParameters ? head::kOfSetup : head::kOfFirst);
   }
-  if (table.best) {
-    text += fmt::format("# {}{}{}{}\n", kBest, table.best->number, kAggregate, formatReal(table.best->aggregate));
-  }
+  if (table.best) text += head::line(head::kBest, *table.best, {});
   text.append(kHeader).append("\n");
   for (const ShownSeries& series : table.series) {
     for (std::size_t i = 0; i < series.seconds.size(); ++i) {

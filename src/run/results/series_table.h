@@ -1,14 +1,18 @@
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <optional>
+#include <span>
 #include <string>
 #include <string_view>
 #include <vector>
 
+#include "measures/output_measure.h"
+
 namespace mirevo {
 
-/// Which evaluation a column of simulated values is of.
+/// An evaluation that is shown: the initial or the best one.
 struct ShownEvaluation {
   int number = 0;
   double aggregate = 0.0;  ///< NaN while the run does not know it
@@ -34,6 +38,9 @@ struct SeriesTable {
   std::optional<ShownEvaluation> best;
   std::vector<ShownSeries> series;
 };
+
+/// The names by which the table calls the measures of those 0-based numbers, no two the same.
+std::vector<std::string> seriesNames(std::span<const OutputMeasure> measures, std::span<const std::size_t> shown);
 
 /// As text: `#` head lines, a header row, tab-separated rows. Numbers read back as the same 32 bits.
 std::string seriesTableText(const SeriesTable& table);

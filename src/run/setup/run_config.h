@@ -68,8 +68,6 @@ struct RunConfig {
   bool keepsSimulatedValues() const { return task && task->keepsSimulatedValues(); }
   /// "Parameter optimisation: Dynamically Dimensioned Search"; "none" without a task.
   std::string taskDescription() const { return task ? task->description() : "none"; }
-  /// The ending of the task's result file, behind the setup's name; empty without a task.
-  std::string_view resultFileEnding() const { return task ? task->facts().resultFileEnding : std::string_view{}; }
   std::size_t variableParameterCount() const;
 };
 

@@ -74,7 +74,7 @@ void logBestSet(const TaskContext& context, const ParameterSet& best, const Eval
 }  // namespace
 
 const TaskFacts& OptimisationTask::facts() const {
-  static constexpr TaskFacts kFacts{{2, "optimisation"}, "_Optimisation.dat"};
+  static constexpr TaskFacts kFacts{{2, "optimisation"}, run_files::kOptimisation};
   return kFacts;
 }
 

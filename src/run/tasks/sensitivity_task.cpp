@@ -8,12 +8,14 @@
 #include <fmt/format.h>
 
 #include "algorithms/analyses/covariance.h"
+#include "common/calendar.h"
 #include "measures/period_series.h"
 #include "run/tasks/analysis_names.h"
 
 namespace mirevo {
 namespace {
 
+constexpr double kSecondsPerDay = 86400.0;
 constexpr CodeName kTypeNames[] = {{0, "local"}};
 
 const SettingSection<SensitivityTask>& sensitivitySection() {
@@ -51,6 +53,7 @@ void validateLocalSensitivity(const SensitivitySettings& settings, std::span<con
 /// What the covariance is computed from: one entry an observation, and one row of simulated values a set.
 struct ComparedValues {
   std::vector<double> observed;  ///< NaN for an observation that does not count
+  std::vector<ObservationLabel> labels;
   std::vector<double> weights;
   std::vector<std::vector<double>> simulated;  ///< empty for a set that failed
 };
@@ -80,34 +83,47 @@ ComparedValues compareSeries(const TaskContext& context, std::span<const Evaluat
       compared.simulated[i].insert(compared.simulated[i].end(), from,
                                    from + static_cast<std::ptrdiff_t>(series.values.size()));
     }
+    const std::int64_t origin = secondNumber(series.start);
     for (std::size_t t = 0; t < series.values.size(); ++t) {
       const bool isAbove = results.front().ok() && results.front().simulatedValues[begin + t] > series.values[t];
       const double weight = isAbove ? measure.weightAbove : measure.weight;
       compared.observed.push_back(weight == 0.0 ? std::numeric_limits<double>::quiet_NaN() : series.values[t]);
       compared.weights.push_back(weight * weight);
+      compared.labels.push_back({measure.name, isoTime(origin + std::llround(series.days[t] * kSecondsPerDay))});
     }
   }
   return compared;
 }
 
-std::vector<std::string> reportCovariance(const TaskContext& context, const LocalSensitivity& sensitivity) {
+/// Adds the covariance to what the analysis found.
+void addCovariance(const TaskContext& context, const LocalSensitivity& sensitivity, TaskOutcome& outcome) {
+  outcome.report.emplace_back();
   if (!sensitivity.results.front().ok()) {
-    return {"Warning: No covariance matrix: the model run with the initial values failed"};
+    outcome.report.emplace_back("Warning: No covariance matrix: the model run with the initial values failed");
+    return;
   }
   ComparedValues compared = compareSeries(context, sensitivity.results);
   if (compared.observed.empty()) {
-    return {"Warning: No covariance matrix: no objective function compares time series"};
+    outcome.report.emplace_back("Warning: No covariance matrix: no objective function compares time series");
+    return;
   }
   const std::optional<LinearisedModel> model =
       linearise(sensitivity.plan, compared.simulated, compared.observed, std::move(compared.weights));
-  if (!model) return {"Warning: No covariance matrix: the model run with the initial values failed"};
-  return formatCovariance(parameterCovariance(*model), context.space, sensitivity.plan.sets.front());
+  if (!model) {
+    outcome.report.emplace_back("Warning: No covariance matrix: the model run with the initial values failed");
+    return;
+  }
+  const ParameterCovariance covariance = parameterCovariance(*model);
+  const ParameterSet& set = sensitivity.plan.sets.front();
+  for (std::string& line : formatCovariance(covariance, context.space, set)) outcome.report.push_back(std::move(line));
+  for (DataTable& table : covarianceTables(covariance, context.space, set)) outcome.tables.push_back(std::move(table));
+  outcome.tables.push_back(jacobianTable(*model, context.space, compared.labels));
 }
 
 }  // namespace
 
 const TaskFacts& SensitivityTask::facts() const {
-  static constexpr TaskFacts kFacts{{1, "sensitivity"}, "_Sensitivity.dat"};
+  static constexpr TaskFacts kFacts{{1, "sensitivity"}, run_files::kSensitivity};
   return kFacts;
 }
 
@@ -137,11 +153,10 @@ TaskOutcome SensitivityTask::run(const TaskContext& context) {
   TaskOutcome outcome{std::string(kEndOfTask)};
   if (type != SensitivityType::local) return outcome;
   const LocalSensitivity sensitivity = localSensitivity(settings, context.space, context.evaluator);
-  outcome.report = formatSensitivity(sensitivity, analysisNames(context));
-  if (settings.calculatesCovariance) {
-    outcome.report.emplace_back();
-    for (std::string& line : reportCovariance(context, sensitivity)) outcome.report.push_back(std::move(line));
-  }
+  const AnalysisNames names = analysisNames(context);
+  outcome.report = formatSensitivity(sensitivity, names);
+  outcome.tables = sensitivityTables(sensitivity, names);
+  if (settings.calculatesCovariance) addCovariance(context, sensitivity, outcome);
   logReport(context, outcome.report);
   return outcome;
 }

@@ -11,6 +11,7 @@
 #include "algorithms/searches/search_method.h"
 #include "common/data_table.h"
 #include "common/progress_messages.h"
+#include "common/run_files.h"
 #include "common/settings/keyword_row.h"
 #include "evaluation/evaluator.h"
 #include "measures/objective_functions.h"
@@ -26,8 +27,8 @@ struct SensitivitySettings;
 
 /// What is always true of a task, whatever its settings.
 struct TaskFacts {
-  CodeName name;                      ///< in setups; the name also tells reports which task it is: "optimisation"
-  std::string_view resultFileEnding;  ///< behind the setup's name: "_Optimisation.dat"
+  CodeName name;  ///< in setups; the name also tells reports which task it is: "optimisation"
+  ResultFileNames resultFiles;
 };
 
 /// What a task may look at while it reads its sections.

@@ -17,7 +17,7 @@ std::vector<std::string> reportBands(const TaskContext& context, std::span<const
     const SeriesBand band = seriesBand(observed.values, results, first);
     first += observed.values.size();
     const std::string& name = context.measures[observed.measure].name;
-    files.push_back({fmt::format("{}_Band_{}.csv", context.filePrefix, observed.measure + 1),
+    files.push_back({runFilePath(context.filePrefix, run_files::kBand, static_cast<int>(observed.measure) + 1),
                      seriesBandText(name, observed, band)});
     lines.push_back(band.observationCount == 0
                         ? fmt::format("Band of {}: no observation has a simulated value", name)
@@ -31,7 +31,7 @@ std::vector<std::string> reportBands(const TaskContext& context, std::span<const
 }  // namespace
 
 const TaskFacts& UncertaintyTask::facts() const {
-  static constexpr TaskFacts kFacts{{3, "uncertainty"}, ".dat"};
+  static constexpr TaskFacts kFacts{{3, "uncertainty"}, run_files::kPlain};
   return kFacts;
 }
 
@@ -58,7 +58,10 @@ TaskOutcome UncertaintyTask::run(const TaskContext& context) {
   const UncertaintyOutcome found = uncertaintyAnalysis(settings, randomSeed, context.evaluator,
                                                        [&](std::string_view text) { context.log.line(text); });
   TaskOutcome outcome{std::string(kEndOfTask)};
-  outcome.report = formatUncertainty(summariseUncertainty(found), analysisNames(context));
+  const UncertaintySummary summary = summariseUncertainty(found);
+  const AnalysisNames names = analysisNames(context);
+  outcome.report = formatUncertainty(summary, names);
+  outcome.tables = uncertaintyTables(summary, names);
   logReport(context, outcome.report);
   const std::vector<std::string> bands = reportBands(context, found.results, outcome.files);
   logReport(context, bands);

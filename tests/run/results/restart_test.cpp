@@ -3,8 +3,10 @@
 #include <cmath>
 #include <functional>
 
+#include <fmt/format.h>
 #include <gmock/gmock.h>
 
+#include "common/run_files.h"
 #include "run/results/failed_run_file.h"
 #include "run/results/restart_settings.h"
 #include "run/results/simulated_values_file.h"
@@ -98,22 +100,24 @@ class EarlierRunTest : public SetupFixture {
   }
   /// The numbers of the rows that a run with `now` goes on from; or the refusal.
   std::string taken(const RunConfig& then, const RunConfig& now, const std::string& rows) {
-    const RestartFiles files = restartFiles(folder_ / "setup_Optimisation.dat");
-    folder_.write("setup_Optimisation.dat", "# Started: then\n" + std::string(kHeader) + rows);
+    const RestartFiles files = restartFiles(folder_ / "setup", run_files::kOptimisation);
+    folder_.write("setup_Optimisation.dat", "# Started: then\n# Restarted: later\n" + std::string(kHeader) + rows);
     writeRestartSettings(files.settings, then);
     try {
-      const auto run = findEarlierRun(files, now, {{"Depth", "Rate"}, {"Flow error", "Written"}, {"Flow"}});
+      const auto run = findEarlierRun(files, now, {{"Depth", "Rate"}, {"Flow error", "Written"}, {"Flow"}}, record_);
       if (!run) return "nothing";
-      EXPECT_EQ(run->history, std::vector<std::string>{"Started: then"});
+      EXPECT_EQ(run->started, record_ ? record_->started : "then");
+      EXPECT_THAT(run->restarted, ElementsAre("later"));
       searches_ = run->searches;
       std::string numbers;
-      for (const ResultTable::Row& entry : run->rows) numbers += std::to_string(entry.number) + " ";
+      for (const ResultRow& entry : run->rows) numbers += std::to_string(entry.number) + " ";
       return numbers;
     } catch (const FatalError& error) {
       return error.detail();
     }
   }
 
+  std::optional<RunRecord> record_;  ///< none: of a version of the program that left none
   std::vector<EarlierSearch> searches_;
 };
 
@@ -123,6 +127,8 @@ TEST_F(EarlierRunTest, RowsThatTheRunGoesOnFrom) {
   const std::string rows = row(1) + row(3, "FAILED") + row(2) + row(5, "FAILED") + row(4, "FAILED");
   EXPECT_EQ(taken(config, config, ""), "nothing");
   EXPECT_EQ(taken(config, config, rows), "1 2 3 4 5 ");
+  record_.emplace().started = "the day before";
+  record_->restarted = {"later"};
   EXPECT_EQ(taken(config, config, rows + row(5)), "1 2 3 4 5 ");
   EXPECT_EQ(taken(config, config, rows + "6\tOK\t400\t0"), "1 2 3 4 5 ");
   EXPECT_EQ(taken(config, config, rows + row(30) + row(31)), "1 2 3 4 5 30 31 ");
@@ -171,7 +177,8 @@ TEST_F(EarlierRunTest, ARaisedBudgetOfDdsIsAnotherSearch) {
 
 TEST_F(EarlierRunTest, WithoutItsSettingsOrItsHeaderItIsRefused) {
   const RunConfig config = read();
-  const RestartFiles files = restartFiles(folder_ / "setup_Optimisation.dat");
+  const RestartFiles files = restartFiles(folder_ / "setup", run_files::kOptimisation);
+  const std::string settings = formatRestartSettings(restartSettings(config));
   const std::string damaged = "Evalu\tStatus\n" + row(1) + row(2);
   const struct {
     std::string results;
@@ -179,11 +186,12 @@ TEST_F(EarlierRunTest, WithoutItsSettingsOrItsHeaderItIsRefused) {
     const char* detail;
   } cases[] = {{std::string(kHeader) + row(1), "", "setup_Optimisation_Restart.dat"},
                {std::string(kHeader) + row(1), "# nothing\n", "setup_Optimisation_Restart.dat"},
-               {damaged, "", "setup_Optimisation.dat has no header row that can be read"}};
+               {damaged, "", "setup_Optimisation.dat has no header row that can be read"},
+               {std::string(kHeader) + row(1), settings.c_str(), "setup_Optimisation.dat has other columns than"}};
   for (const auto& c : cases) {
     folder_.write("setup_Optimisation.dat", c.results);
     if (*c.settings != 0) folder_.write("setup_Optimisation_Restart.dat", c.settings);
-    EXPECT_THAT(withoutFolder(refusalOf([&] { findEarlierRun(files, config, {}); })),
+    EXPECT_THAT(withoutFolder(refusalOf([&] { findEarlierRun(files, config, {}, std::nullopt); })),
                 HasSubstr(std::string("\n") + c.detail));
   }
 }
@@ -223,32 +231,47 @@ TEST(SimulatedValuesFile, KeepsWholeRecordsOfTheEvaluationsThatCount) {
 
 TEST(FailedRunFile, IsTakenUpWithTheFailuresThatCount) {
   const TemporaryFolder folder;
-  const auto fail = [](int number, std::string reason) {
+  const FailedRunPaths paths{folder / "calSimErr.dat", folder / "basin_Failures.dat"};
+  const auto fail = [](int number, std::vector<std::string> output = {}) {
     EvaluationResult result;
     result.number = number;
-    result.failure = EvaluationFailure{EvaluationFailure::Kind::timedOut, std::move(reason), {"Evaluation No. 7"}};
+    result.failure = EvaluationFailure{EvaluationFailure::Kind::timedOut, fmt::format("why\n\"of\"\t#{}", number),
+                                       std::move(output)};
     return result;
   };
-  const std::vector<double> values{0.5};
+  const std::vector<std::string> output{"Evaluation No. 7 (batch ran too long)", "", "\x1B[31m\xFF\\x41\r"};
+  const std::vector<double> values{0.1 + 0.2};
   {
-    FailedRunFile file(folder / "calSimErr.dat", "basin", {"k"});
-    for (const int number : {2, 9, 5}) file.add(values, fail(number, "why\nof " + std::to_string(number)));
+    FailedRunFile file(paths, "basin", {"k"}, {"Title"});
+    for (const int number : {2, 9, 5}) file.add(values, fail(number, output));
+    file.add(values, fail(6, {""}));
   }
-  const std::string whole = folder.read("calSimErr.dat");
-  folder.write("calSimErr.dat", whole + "\nEvaluation No. 11 (batch ran");
-  FailedRunFile file(folder / "calSimErr.dat", "basin", {"k"});
-  const auto failures = file.takeUp({2, 5, 11});
-  ASSERT_THAT(failures, ElementsAre(testing::Key(2), testing::Key(5)));
+  const std::string told = folder.read("calSimErr.dat");
+  const std::string table = folder.read("basin_Failures.dat");
+  folder.write("basin_Failures.dat", table + "11\ttimedOut\twhy\t");  // cut off
+  FailedRunFile file(paths, "basin", {"k"}, {"Title"});
+  const auto failures = file.takeUp({{2, values}, {5, values}, {6, values}, {11, values}});
+  ASSERT_THAT(failures, ElementsAre(testing::Key(2), testing::Key(5), testing::Key(6)));
   EXPECT_EQ(failures.at(5).kind, EvaluationFailure::Kind::timedOut);
-  EXPECT_EQ(failures.at(5).reason, "why of 5");
-  file.add(values, fail(9, "why\nof 9"));
-  const auto nine = whole.find("\nEvaluation No. 9");
-  const auto five = whole.find("\nEvaluation No. 5 ");
-  EXPECT_EQ(folder.read("calSimErr.dat"), whole.substr(0, nine) + whole.substr(five) + whole.substr(nine, five - nine));
+  EXPECT_EQ(failures.at(5).reason, "why\n\"of\"\t#5");
+  EXPECT_EQ(failures.at(5).lastOutput, output);
+  EXPECT_THAT(failures.at(6).lastOutput, ElementsAre(""));
+  // Both files go on as if the evaluation that is made again had not been there.
+  file.add(values, fail(9, output));
+  const auto moved = [](const std::string& text, std::size_t from, std::size_t to) {
+    return text.substr(0, from) + text.substr(to) + text.substr(from, to - from);
+  };
+  EXPECT_EQ(folder.read("calSimErr.dat"),
+            moved(told, told.find("\nEvaluation No. 9"), told.find("\nEvaluation No. 5")));
+  EXPECT_EQ(folder.read("basin_Failures.dat"), moved(table, table.find("\n9\t") + 1, table.find("\n5\t") + 1));
 
-  FailedRunFile others(folder / "calSimErr.dat", "another", {"k"});
-  EXPECT_THAT(others.takeUp({2}), IsEmpty());
+  folder.write("calSimErr.dat", "# Failed evaluations of another\n");
+  EXPECT_THAT(FailedRunFile(paths, "basin", {"k"}, {"Title"}).takeUp({{2, values}}), ElementsAre(testing::Key(2)));
   EXPECT_TRUE(folder.exists("calSimErr.1.dat")) << "another setup's evidence is kept";
+  EXPECT_THAT(folder.read("calSimErr.dat"), HasSubstr("\nEvaluation No. 2 (batch ran too long)\n   why \"of\"\t#2\n"));
+  std::filesystem::remove(paths.table);  // of a version of the program that left none
+  EXPECT_THAT(FailedRunFile(paths, "basin", {"k"}, {"Title"}).takeUp({{2, values}}), IsEmpty());
+  EXPECT_TRUE(folder.exists("calSimErr.2.dat"));
 }
 
 }  // namespace

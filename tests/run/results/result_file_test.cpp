@@ -37,7 +37,9 @@ constexpr std::string_view kHeadText =
 class ResultFileTest : public ::testing::Test {
  protected:
   void open() { results_.open(path_, kHead, kColumns); }
-  void add(const EvaluationResult& result, double parameter) { results_.addRow(std::span(&parameter, 1), result); }
+  void add(const EvaluationResult& result, double parameter) {
+    results_.addRow(resultRow(std::span(&parameter, 1), result));
+  }
 
   TemporaryFolder folder_;
   std::string path_ = (folder_ / "r.dat");
@@ -96,7 +98,7 @@ void writeUntilNoRoomIsLeft(const std::string& path) {
   results.open(path, kHead, kColumns);
   const double parameter = 1.0 / 3.0;
   try {
-    for (int number = 1;; ++number) results.addRow(std::span(&parameter, 1), success(number, 1, 1));
+    for (int number = 1;; ++number) results.addRow(resultRow(std::span(&parameter, 1), success(number, 1, 1)));
   } catch (const FatalError&) {
     ::_exit(7);
   }
@@ -131,7 +133,7 @@ TEST(KeepEarlierFile, NumbersWithoutOverwriting) {
 
 TEST(FailedRunFile, AppearsWithTheFirstFailureAndSaysWhatHappened) {
   const TemporaryFolder folder;
-  FailedRunFile file((folder / "calSimErr.dat"), "basin", {"k", "n"});
+  FailedRunFile file({folder / "calSimErr.dat", folder / "basin_Failures.dat"}, "basin", {"k", "n"}, {});
   EXPECT_FALSE(folder.exists("calSimErr.dat"));
   const std::vector<double> values{0.1, 2.0};
   file.add(values, failure(4));

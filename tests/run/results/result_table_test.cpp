@@ -11,6 +11,7 @@
 namespace mirevo {
 namespace {
 
+const ResultColumns kColumns{{"X1"}, {"RMSE"}, {}};
 const std::string kHead = "# A title\n# Mirevo\nEvaluation\tStatus\tX1\tRMSE\tAggregate\n";
 
 TEST(ResultTable, EveryNumberComesBackAsItWas) {
@@ -21,17 +22,16 @@ TEST(ResultTable, EveryNumberComesBackAsItWas) {
     text += std::to_string(i + 1) + "\tOK\t" + formatReal(values[i]) + "\t1\t2\n";
   }
   text += "# Cancelled\n# Best evaluation: 1\n";
-  const ResultTable table = readResultTable(text);
+  const ResultTable table = readResultTable(text, kColumns);
   ASSERT_EQ(table.rows.size(), values.size());
   for (std::size_t i = 0; i < values.size(); ++i) {
     EXPECT_EQ(table.rows[i].number, static_cast<int>(i) + 1);
-    EXPECT_EQ(std::isnan(values[i]), std::isnan(table.rows[i].values[0]));
+    EXPECT_EQ(std::isnan(values[i]), std::isnan(table.rows[i].parameters[0]));
     if (!std::isnan(values[i])) {
-      EXPECT_EQ(std::bit_cast<std::uint64_t>(table.rows[i].values[0]), std::bit_cast<std::uint64_t>(values[i]));
+      EXPECT_EQ(std::bit_cast<std::uint64_t>(table.rows[i].parameters[0]), std::bit_cast<std::uint64_t>(values[i]));
     }
   }
   EXPECT_EQ(table.headLines, (std::vector<std::string>{"A title", "Mirevo"}));
-  EXPECT_EQ(table.columns, (std::vector<std::string>{"X1", "RMSE", "Aggregate"}));
   EXPECT_EQ(table.closingLines, (std::vector<std::string>{"Cancelled", "Best evaluation: 1"}));
 }
 
@@ -39,24 +39,36 @@ TEST(ResultTable, AFileCutAtAnyByteHoldsItsWholeRowsAndNoOther) {
   const std::string rows = "1\tOK\t1.25\t3\t3\n2\tFAILED\t2.5\t1e+30\t1e+30\n";
   const std::string text = kHead + rows;
   for (std::size_t length = 0; length <= text.size(); ++length) {
-    const ResultTable table = readResultTable(std::string_view(text).substr(0, length));
+    const ResultTable table = readResultTable(std::string_view(text).substr(0, length), kColumns);
     const std::size_t firstEnd = kHead.size() + rows.find('\n') + 1;
     ASSERT_EQ(table.rows.size(), length == text.size() ? 2u : (length >= firstEnd ? 1u : 0u)) << length;
     if (!table.rows.empty()) {
-      EXPECT_EQ(table.rows[0].values, (std::vector<double>{1.25, 3, 3}));
+      EXPECT_EQ(resultRowText(table.rows[0]), "1\tOK\t1.25\t3\t3");
     }
   }
+}
+
+TEST(ResultTable, OtherColumnsAreToldFromNone) {
+  for (const char* header : {"Evaluation\tStatus\tX2\tRMSE\tAggregate\n", "Evaluation\tStatus\tX1\tAggregate\n"}) {
+    const ResultTable table = readResultTable(std::string(header) + "1\tOK\t1\t2\t3\n2\tOK\t1\t2\n", kColumns);
+    EXPECT_TRUE(table.hasHeader);
+    EXPECT_FALSE(table.hasExpectedColumns);
+    EXPECT_EQ(table.rows.size(), 0U);
+    EXPECT_EQ(table.rowsOfOtherColumns, 1U);
+    EXPECT_EQ(table.unusableLines, 1U);
+  }
+  EXPECT_TRUE(readResultTable("Evaluation\tStatus\tX1 \t RMSE\tAggregate\n", kColumns).hasExpectedColumns);
 }
 
 TEST(ResultTable, DamagedRowsAreCountedAndPassedOver) {
   for (const std::string row : {"x\tOK\t1\t2\t3", "0\tOK\t1\t2\t3", "1\tDONE\t1\t2\t3", "1\tOK\t1\t2",
                                 "1\tOK\t1\t2\t3\t4", "1\tOK\t1\t\t3", "1\tOK\t1\t2\t3x", "99999999999\tOK\t1\t2\t3"}) {
-    const ResultTable table = readResultTable(kHead + row + "\n2\tOK\t1\t2\t3\n");
+    const ResultTable table = readResultTable(kHead + row + "\n2\tOK\t1\t2\t3\n", kColumns);
     EXPECT_EQ(table.unusableLines, 1u) << row;
     ASSERT_EQ(table.rows.size(), 1u) << row;
     EXPECT_EQ(table.rows[0].number, 2) << row;
   }
-  EXPECT_FALSE(readResultTable("some other\ttext\n").hasHeader());
+  EXPECT_FALSE(readResultTable("some other\ttext\n", kColumns).hasHeader);
 }
 
 }  // namespace

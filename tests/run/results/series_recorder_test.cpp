@@ -23,6 +23,7 @@ class SeriesRecorderTest : public ::testing::Test {
     run.observations = {{{10, 30}, {1.0F, 3.0F}}};
     run.periodFirst = 10;
     run.periodLast = 30;
+    run.initialValues = {0.5};
     return {folder_ / "s_Series.dat", std::move(run), [this] { return now_; },
             [this](std::string_view text) { warnings_.emplace_back(text); }};
   }
@@ -35,9 +36,9 @@ class SeriesRecorderTest : public ::testing::Test {
     result.aggregate = aggregate;
     const auto simulated = static_cast<float>(number);
     if (hasSeries) result.shownSeries = {{{0, 20, 40}, {simulated, simulated, simulated}}};
-    const std::vector<double> values{value < 0.0 ? number : value};
+    const std::vector<double> values{isInitial ? 0.5 : value < 0.0 ? number : value};
     if (aggregate < (best_ ? best_->aggregate : 1e30)) best_ = BestEvaluation{number, aggregate, values};
-    to.evaluationFinished(result, values, isInitial, best_);
+    to.evaluationFinished(result, values, best_);
   }
 
   SeriesTable table() const { return readSeriesTable(folder_.read("s_Series.dat")); }

@@ -1,0 +1,54 @@
+#include "common/run_files.h"
+
+#include <vector>
+
+namespace mirevo {
+namespace {
+
+std::vector<RunFile> filesOfSetup() {
+  using namespace run_files;
+  std::vector<RunFile> files{kLog,    kTerminationLog, kMessages, kKill,        kRecord,       kFailures,
+                             kSeries, kReport,         kBand,     kSavedFolder, kFailedFolder, kProcessFolder};
+  for (const ResultFileNames& names : {kPlain, kSensitivity, kOptimisation}) {
+    files.insert(files.end(), {names.results, names.restart, names.simulatedValues});
+  }
+  files.insert(files.end(), kAnalysisTables.begin(), kAnalysisTables.end());
+  return files;
+}
+
+}  // namespace
+
+std::span<const RunFile> runFilesOfSetup() {
+  static const std::vector<RunFile> kFiles = filesOfSetup();
+  return kFiles;
+}
+
+std::string runFilePath(std::string_view prefix, const RunFile& file) {
+  std::string path(prefix);
+  path += file.stem;
+  if (!file.isNumbered) path += file.extension;
+  return path;
+}
+
+std::string runFilePath(std::string_view prefix, const RunFile& file, int number) {
+  return std::string(prefix).append(file.stem).append(std::to_string(number)).append(file.extension);
+}
+
+std::string failedRunsPath(std::string_view prefix) {
+  const std::string_view folder = prefix.substr(0, prefix.rfind('/') + 1);
+  return runFilePath(folder, run_files::kFailedRuns);
+}
+
+std::string fileNameOf(std::string_view path) {
+  return std::string(path.substr(path.rfind('/') + 1));
+}
+
+std::string tableName(const RunFile& file) {
+  return std::string(file.stem.substr(1));
+}
+
+std::string dataTablePath(std::string_view prefix, std::string_view tableName) {
+  return std::string(prefix).append("_").append(tableName).append(".dat");
+}
+
+}  // namespace mirevo

@@ -1,0 +1,86 @@
+#pragma once
+
+#include <array>
+#include <span>
+#include <string>
+#include <string_view>
+
+namespace mirevo {
+
+/// How something that a run makes is named: `stem`, a number where it is one of several, `extension`, behind the name
+/// of the setup. What an earlier run made is kept with a number before the extension: `basin_Saved.2`,
+/// `basin_Optimisation.1.dat`.
+struct RunFile {
+  std::string_view stem;
+  std::string_view extension;
+  bool isNumbered = false;   ///< a number follows the stem
+  bool mayBeModels = false;  ///< so plain a name that only the content tells it from a file of the model
+
+  bool operator==(const RunFile&) const = default;
+};
+
+/// The files of one task's results: the table of evaluations, and what a run needs to be taken up again.
+struct ResultFileNames {
+  RunFile results;
+  RunFile restart;
+  RunFile simulatedValues;
+};
+
+/// The names of all that a run makes. Nothing else builds such a name.
+namespace run_files {
+
+inline constexpr RunFile kLog{"", ".log", false, true};
+inline constexpr RunFile kTerminationLog{"_Termination", ".log"};
+inline constexpr RunFile kMessages{"", "._spi_"};
+inline constexpr RunFile kKill{"", "._kill_"};
+inline constexpr RunFile kRecord{"_Run", ".dat", false, true};
+inline constexpr RunFile kFailures{"_Failures", ".dat", false, true};
+inline constexpr RunFile kSeries{"_Series", ".dat"};
+inline constexpr RunFile kReport{"_Report", ".html"};
+inline constexpr RunFile kBand{"_Band_", ".csv", true};
+inline constexpr RunFile kSavedFolder{"_Saved", ""};
+/// These two stand beside the setup, or in the folder that it names for them.
+inline constexpr RunFile kFailedFolder{"_Failed", "", true};
+inline constexpr RunFile kProcessFolder{"_Process", "", true};
+
+/// Scenario runs and the uncertainty analysis.
+inline constexpr ResultFileNames kPlain{{"", ".dat", false, true}, {"_Restart", ".dat"}, {"_Simulated", ".bin"}};
+inline constexpr ResultFileNames kSensitivity{
+    {"_Sensitivity", ".dat"}, {"_Sensitivity_Restart", ".dat"}, {"_Sensitivity_Simulated", ".bin"}};
+inline constexpr ResultFileNames kOptimisation{
+    {"_Optimisation", ".dat"}, {"_Optimisation_Restart", ".dat"}, {"_Optimisation_Simulated", ".bin"}};
+
+/// The tables in which analyses give what they found.
+inline constexpr RunFile kCovariance{"_Covariance", ".dat", false, true};
+inline constexpr RunFile kCorrelation{"_Correlation", ".dat", false, true};
+inline constexpr RunFile kParameterLimits{"_ParameterLimits", ".dat", false, true};
+inline constexpr RunFile kJacobian{"_Jacobian", ".dat", false, true};
+inline constexpr RunFile kSensitivities{"_Sensitivities", ".dat", false, true};
+inline constexpr RunFile kQuantiles{"_Quantiles", ".dat", false, true};
+inline constexpr RunFile kSampleCorrelation{"_SampleCorrelation", ".dat", false, true};
+inline constexpr std::array kAnalysisTables{kCovariance,    kCorrelation, kParameterLimits,  kJacobian,
+                                            kSensitivities, kQuantiles,   kSampleCorrelation};
+
+/// Stands beside the setup without its name.
+inline constexpr RunFile kFailedRuns{"calSimErr", ".dat"};
+
+}  // namespace run_files
+
+/// All of them whose names begin with the setup's.
+std::span<const RunFile> runFilesOfSetup();
+
+/// The path of a run's file; `prefix` is folder and name of the setup. Of a numbered one what stands before the number.
+std::string runFilePath(std::string_view prefix, const RunFile& file);
+/// That of a numbered one.
+std::string runFilePath(std::string_view prefix, const RunFile& file, int number);
+/// `calSimErr.dat` beside the setup.
+std::string failedRunsPath(std::string_view prefix);
+/// The file's name without a folder, for messages: `calSimErr.dat`, `basin_Failures.dat`.
+std::string fileNameOf(std::string_view path);
+
+/// What a DataTable is called whose file this is: "Covariance".
+std::string tableName(const RunFile& file);
+/// The file of a DataTable of that name.
+std::string dataTablePath(std::string_view prefix, std::string_view tableName);
+
+}  // namespace mirevo

@@ -1,0 +1,74 @@
+#include "report/run_sources.h"
+
+#include <algorithm>
+#include <array>
+#include <ctime>
+#include <sys/stat.h>
+#include <utility>
+
+#include "common/files.h"
+#include "common/run_files.h"
+#include "run/results/run_lock.h"
+
+namespace mirevo {
+namespace {
+
+/// Local time at which the file was last written; empty where there is none.
+std::string timeOfFile(const std::string& path) {
+  struct stat status {};
+  if (::stat(path.c_str(), &status) != 0) return {};
+  std::tm local{};
+  ::localtime_r(&status.st_mtime, &local);
+  std::array<char, 40> text{};
+  return {text.data(), std::strftime(text.data(), text.size(), "%Y-%m-%d %H:%M:%S", &local)};
+}
+
+template <class Content, class Read>
+OptionalSource<Content> readSource(const std::string& path, Read read) {
+  OptionalSource<Content> source;
+  source.file = fileNameOf(path);
+  if (const auto text = readTextFile(path, source.reason)) source.content = read(*text);
+  return source;
+}
+
+}  // namespace
+
+std::optional<RunSources> readRunSources(const RunConfig& config, const SearchSpace& space,
+                                         const std::string& filePrefix, std::string& reason) {
+  const ResultFileNames* names = config.task ? &config.task->facts().resultFiles : nullptr;
+  if (!names) {
+    reason = "the setup names no task that has results";
+    return std::nullopt;
+  }
+  const std::string path = runFilePath(filePrefix, names->results);
+  const auto text = readTextFile(path, reason);
+  if (!text) {
+    reason = path + ": " + reason;
+    return std::nullopt;
+  }
+  RunSources sources;
+  sources.results = readResultTable(*text, resultColumns(config, space));
+  std::stable_sort(sources.results.rows.begin(), sources.results.rows.end(),
+                   [](const ResultRow& a, const ResultRow& b) { return a.number < b.number; });
+  auto record = readRunRecord(readFileIfThere(runFilePath(filePrefix, run_files::kRecord)).value_or(""));
+  const bool isGoingOn = RunLock::isHeld(config.setupFile);
+  if (!record) {
+    record = recordOfEarlierVersion(sources.results);
+    if (isGoingOn) record->stage.reset();
+  }
+  sources.record = *std::move(record);
+  sources.stage = sources.record.stage.value_or(isGoingOn ? RunStage::running : RunStage::cutOff);
+  if (sources.stage == RunStage::running) return sources;
+  sources.ended = sources.record.ended.empty() ? timeOfFile(path) : sources.record.ended;
+  return sources;
+}
+
+OptionalSource<std::vector<FailureRow>> readFailures(const std::string& filePrefix) {
+  return readSource<std::vector<FailureRow>>(runFilePath(filePrefix, run_files::kFailures), readFailureTable);
+}
+
+OptionalSource<SeriesTable> readSeries(const std::string& filePrefix) {
+  return readSource<SeriesTable>(runFilePath(filePrefix, run_files::kSeries), readSeriesTable);
+}
+
+}  // namespace mirevo

@@ -1,0 +1,148 @@
+#include "run/results/result_row.h"
+
+#include <algorithm>
+#include <concepts>
+
+#include "common/data_table.h"
+#include "common/text.h"
+
+namespace mirevo {
+namespace {
+
+constexpr std::string_view kOk = "OK";
+constexpr std::string_view kFailed = "FAILED";
+
+/// The order of the columns: gives each to `visit`, a single one with its name, those of a group with their names.
+/// Stops where that returns false, and returns whether it came to the end.
+template <class Row, class Columns, class Visit>
+bool visitColumns(Row& row, const Columns& columns, Visit&& visit) {
+  return visit(row.number, "Evaluation") && visit(row.ok, "Status") && visit(row.parameters, columns.parameters) &&
+         visit(row.measures, columns.measures) && visit(row.objectives, columns.objectives) &&
+         visit(row.aggregate, "Aggregate");
+}
+
+void addCell(std::string& line, std::string_view cell) {
+  if (!line.empty()) line += '\t';
+  line += cell;
+}
+
+/// Puts the headings behind each other.
+struct HeaderWriter {
+  std::string line;
+  bool operator()(const auto&, const char* name) {
+    addCell(line, name);
+    return true;
+  }
+  bool operator()(const std::vector<double>&, const std::vector<std::string>& names) {
+    for (const std::string& name : names) addCell(line, columnName(name));
+    return true;
+  }
+};
+
+struct RowWriter {
+  std::string line;
+  bool operator()(int number, const char*) { return add(std::to_string(number)); }
+  bool operator()(std::same_as<bool> auto ok, const char*) { return add(ok ? kOk : kFailed); }
+  bool operator()(double value, const char*) { return add(formatReal(value)); }
+  bool operator()(const std::vector<double>& values, const std::vector<std::string>&) {
+    for (const double value : values) addCell(line, formatReal(value));
+    return true;
+  }
+  bool add(std::string_view cell) {
+    addCell(line, cell);
+    return true;
+  }
+};
+
+/// Takes the cells of a line one after another.
+struct RowReader {
+  std::string_view rest;
+  bool isAtEnd = false;  ///< behind the last cell
+
+  bool operator()(int& number, const char*) {
+    const auto read = parseInteger(next());
+    number = read.value_or(0);
+    return number > 0;
+  }
+  bool operator()(bool& ok, const char*) {
+    const std::string_view cell = next();
+    ok = cell == kOk;
+    return ok || cell == kFailed;
+  }
+  bool operator()(double& value, const char*) { return read(value); }
+  bool operator()(std::vector<double>& values, const std::vector<std::string>& names) {
+    values.resize(names.size());
+    return std::all_of(values.begin(), values.end(), [this](double& value) { return read(value); });
+  }
+
+  bool read(double& value) {
+    const auto number = realCell(next());
+    value = number.value_or(0.0);
+    return number.has_value();
+  }
+  std::string_view next() {
+    const std::size_t tab = rest.find('\t');
+    const std::string_view cell = rest.substr(0, tab);
+    isAtEnd = tab == std::string_view::npos;
+    rest.remove_prefix(isAtEnd ? rest.size() : tab + 1);
+    return cell;
+  }
+};
+
+}  // namespace
+
+ResultColumns resultColumns(const RunConfig& config, const SearchSpace& space) {
+  ResultColumns columns;
+  columns.parameters = space.names;
+  for (const OutputMeasure& measure : config.measures) columns.measures.push_back(measure.name);
+  for (const ObjectiveFunction& objective : config.objectives) columns.objectives.push_back(objective.name);
+  return columns;
+}
+
+ResultRow resultRow(std::span<const double> parameterValues, const EvaluationResult& result) {
+  return {
+      result.number,          result.ok(),     {parameterValues.begin(), parameterValues.end()}, result.measureValues,
+      result.objectiveValues, result.aggregate};
+}
+
+std::string resultHeader(const ResultColumns& columns) {
+  const ResultRow none;
+  HeaderWriter writer;
+  visitColumns(none, columns, writer);
+  return writer.line;
+}
+
+std::string resultRowText(const ResultRow& row) {
+  RowWriter writer;
+  visitColumns(row, ResultColumns{}, writer);
+  return writer.line;
+}
+
+std::size_t cellCount(std::string_view line) {
+  return static_cast<std::size_t>(std::count(line.begin(), line.end(), '\t')) + 1;
+}
+
+bool isResultHeader(std::string_view line) {
+  const std::string unnamed = resultHeader({});
+  const std::string_view first = std::string_view(unnamed).substr(0, unnamed.find('\t') + 1);
+  return line.starts_with(first) && cellCount(line) >= cellCount(unnamed);
+}
+
+bool hasColumns(std::string_view header, const ResultColumns& columns) {
+  const std::string expected = resultHeader(columns);
+  RowReader given{header};
+  RowReader wanted{expected};
+  while (!given.isAtEnd && !wanted.isAtEnd) {
+    if (trim(given.next()) != trim(wanted.next())) return false;
+  }
+  return given.isAtEnd && wanted.isAtEnd;
+}
+
+std::optional<ResultRow> readResultRow(std::string_view line, const ResultColumns& columns) {
+  ResultRow row;
+  RowReader reader{line};
+  if (!visitColumns(row, columns, reader) || !reader.isAtEnd) return std::nullopt;
+  return row;
+}
+
+}  // namespace mirevo

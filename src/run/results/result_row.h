@@ -1,0 +1,53 @@
+#pragma once
+
+#include <cstddef>
+#include <optional>
+#include <span>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "evaluation/evaluation_result.h"
+#include "parameters/search_space.h"
+#include "run/setup/run_config.h"
+
+namespace mirevo {
+
+/// The names over those columns of a result file of which there is one per parameter, measure or objective function.
+struct ResultColumns {
+  std::vector<std::string> parameters;  ///< variable parameters
+  std::vector<std::string> measures;
+  std::vector<std::string> objectives;
+};
+
+/// One evaluation in a result file. Its columns stand in result_row.cpp, once for writing and for reading.
+struct ResultRow {
+  int number = 0;                  ///< the evaluation's number in its run, from 1
+  bool ok = false;                 ///< its status
+  std::vector<double> parameters;  ///< model scale, one per variable parameter
+  std::vector<double> measures;
+  std::vector<double> objectives;
+  double aggregate = kFailedRunValue;
+};
+
+/// Those of the setup's task.
+ResultColumns resultColumns(const RunConfig& config, const SearchSpace& space);
+
+/// The row of an evaluation; `parameterValues` on the model scale.
+ResultRow resultRow(std::span<const double> parameterValues, const EvaluationResult& result);
+
+/// The header row, without its line end.
+std::string resultHeader(const ResultColumns& columns);
+/// A row, without its line end. Numbers read back as the same 64 bits.
+std::string resultRowText(const ResultRow& row);
+
+/// How many columns a header row or a row has.
+std::size_t cellCount(std::string_view line);
+/// Whether the line is the header row of a result file, with whatever columns.
+bool isResultHeader(std::string_view line);
+/// Whether the header row has these columns.
+bool hasColumns(std::string_view header, const ResultColumns& columns);
+/// The row of a line below a header row with these columns; nothing for a line that holds none.
+std::optional<ResultRow> readResultRow(std::string_view line, const ResultColumns& columns);
+
+}  // namespace mirevo

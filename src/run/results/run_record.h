@@ -1,0 +1,62 @@
+#pragma once
+
+#include <optional>
+#include <string>
+#include <string_view>
+#include <utility>
+#include <vector>
+
+#include "run/results/result_table.h"
+#include "run/results/series_table.h"
+#include "run/setup/run_config.h"
+
+namespace mirevo {
+
+/// How far a run has come.
+enum class RunStage { running, finished, cancelled, failed, cutOff };
+
+/// What files call it: "running", "finished", "cancelled", "failed" or "cut off".
+std::string_view runStageKey(RunStage stage);
+
+/// The account of a run for programs to read, `<setup>_Run.dat`: a table of keys and values. What is not known yet is
+/// left out.
+struct RunRecord {
+  std::string task;     ///< its key
+  std::string program;  ///< its version
+  std::string started;
+  std::vector<std::string> restarted;  ///< each time
+  int plannedEvaluations = 0;          ///< 0: unknown
+  std::optional<int> seed;             ///< where the task draws random numbers
+
+  std::optional<int> initialEvaluation;
+  std::optional<ShownEvaluation> best;
+  int evaluations = 0;
+  int failed = 0;
+  std::vector<std::pair<std::string, int>> failuresByKind;
+  /// Of one objective function, on the way to the aggregate.
+  struct Scale {
+    std::string objective;
+    double sigma = 0.0;
+    double mu = 0.0;
+  };
+  std::vector<Scale> scales;
+
+  std::string ended;  ///< nothing where a signal ended the run
+  /// Nothing while the run goes on, or where it was killed.
+  std::optional<RunStage> stage;
+  std::string message;  ///< why it ended
+};
+
+/// The table as text; `headLines` are for people.
+std::string runRecordText(const RunRecord& record, const std::vector<std::string>& headLines);
+/// Reads that text. Any text is taken; nothing where it is no such table.
+std::optional<RunRecord> readRunRecord(std::string_view text);
+
+/// What a signal handler that ends the run writes behind the record, with its message and a line end behind it.
+std::string endingBeforeMessage(RunStage stage);
+
+/// What the result file of a version of the program without records says of its run. Its lines were for people, and
+/// this reads them as they were then.
+RunRecord recordOfEarlierVersion(const ResultTable& results);
+
+}  // namespace mirevo
