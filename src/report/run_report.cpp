@@ -75,7 +75,7 @@ bool ReportBuilder::readResults(std::string& reason) {
 }
 
 ReportData ReportBuilder::build() {
-  const ResultTable& table = sources_.results;
+  ResultTable& table = sources_.results;
   data_.program = fmt::format("Mirevo {}", programVersion());
   data_.summary = table.closingLines;
   data_.periodFirst = secondNumber(config_.period.start);
@@ -86,8 +86,9 @@ ReportData ReportBuilder::build() {
     note(fmt::format("{} of the result file {} cut off or damaged and left out.",
                      isOne ? "1 line" : fmt::format("{} lines", table.unusableLines), isOne ? "is" : "are"));
   }
-  if (table.hasHeader && !table.hasExpectedColumns) {
-    note("The results are left out: they have other columns than the setup as it is now.");
+  if (!table.hasExpectedColumns) {
+    if (table.hasHeader) note("The results are left out: they have other columns than the setup as it is now.");
+    table.rows.clear();
   }
   addEvaluations();
   findBestAndInitial();

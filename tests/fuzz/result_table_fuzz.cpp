@@ -60,13 +60,13 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
   const std::string_view text(reinterpret_cast<const char*>(data) + 2, size - 2);
   const ResultColumns columns = columnsOf(text);
   const ResultTable table = mirevo::readResultTable(text, columns);
-  require(table.rows.empty() || table.hasExpectedColumns);
+  require(table.rows.empty() || table.hasExpectedCount);
   for (const ResultRow& row : table.rows) {
     require(row.number >= 1 && row.parameters.size() == columns.parameters.size());
   }
   const std::size_t length = text.size() * (data[0] * 256U + data[1]) / 65535U;
   requireFirstRowsOf(table, mirevo::readResultTable(text.substr(0, length), columns));
-  if (!table.hasExpectedColumns) return 0;
+  if (!table.hasExpectedCount) return 0;
   const ResultTable again = mirevo::readResultTable(written(table, columns), columns);
   require(again.rows.size() == table.rows.size() && again.unusableLines == 0);
   requireFirstRowsOf(table, again);

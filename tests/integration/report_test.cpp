@@ -131,10 +131,9 @@ TEST(Report, OfARunThatGoesOnOrWasCutOffSaysSoAndLeavesItsFilesAlone) {
   EXPECT_THAT(reportData(folder),
               AllOf(HasSubstr(R"("state":"cut off")"), HasSubstr("1 line of the result file is cut off"),
                     HasSubstr(R"("evaluations":1,)")));
-  folder.write("basin.dat", results);
   for (const auto& [signal, state, message] :
        {std::tuple{SIGTERM, "cut off", "Termination request"}, {SIGABRT, "failed", "Abnormal termination"}}) {
-    std::filesystem::remove(folder / "first");
+    std::filesystem::remove(folder / "basin.dat");
     RunningProgram run({folder / "basin.kdx"});
     ASSERT_TRUE(waitUntil([&] { return folder.read("basin.dat").find("\n1\tOK\t") != std::string::npos; }));
     run.send(signal);
@@ -147,7 +146,10 @@ TEST(Report, OfARunThatGoesOnOrWasCutOffSaysSoAndLeavesItsFilesAlone) {
 // Results without the files that this version adds: the report has all that the others hold.
 TEST(Report, OfResultsOfAnEarlierVersion) {
   const ModelFolder folder;
-  ASSERT_EQ(runProgram({folder.writeSetup({.maxEvaluations = 30, .modelArguments = "--fail-above 9"})}).exitCode, 0);
+  std::vector<std::string> scenarios{"9, 1, 1"};
+  for (int i = 0; i < 30; ++i) scenarios.push_back(fmt::format("{}, 1, 1", 0.1 * i));
+  folder.writeSetup({.option = 0, .scenarios = scenarios, .modelArguments = "--fail-above 8"});
+  ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0);
   const std::string data = reportData(folder);
   ASSERT_THAT(data, Not(HasSubstr(R"("failures":[])")));
   for (const char* file : {"basin_Run.dat", "basin_Failures.dat"}) std::filesystem::remove(folder / file);

@@ -93,7 +93,7 @@ std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunCon
   const RestartSettings then = readSettings(files.settings);
   const RestartSettings now = restartSettings(config);
   requireSameSettings(then, now);
-  if (!table.hasExpectedColumns) refuse(files.results + " has other columns than the setup asks for");
+  if (!table.hasExpectedCount) refuse(files.results + " has other columns than the setup asks for");
 
   if (!record) record = recordOfEarlierVersion(table);
   EarlierRun run{std::move(table.rows), std::move(record->started), std::move(record->restarted), then.searches, {}};

@@ -10,7 +10,7 @@ namespace {
 
 /// Takes a row's line; false for one that is damaged.
 bool takeRow(std::string_view line, std::size_t columnCount, const ResultColumns& columns, ResultTable& table) {
-  if (!table.hasExpectedColumns) {
+  if (!table.hasExpectedCount) {
     const bool isWhole = cellCount(line) == columnCount;
     if (isWhole) ++table.rowsOfOtherColumns;
     return isWhole;
@@ -40,8 +40,9 @@ ResultTable readResultTable(std::string_view text, const ResultColumns& columns)
       if (!takeRow(line, columnCount, columns, table)) ++table.unusableLines;
     } else if (isResultHeader(line)) {
       table.hasHeader = true;
-      table.hasExpectedColumns = hasColumns(line, columns);
       columnCount = cellCount(line);
+      table.hasExpectedCount = columnCount == cellCount(resultHeader(columns));
+      table.hasExpectedColumns = hasColumns(line, columns);
     } else {
       ++table.unusableLines;
     }

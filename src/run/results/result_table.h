@@ -13,9 +13,10 @@ namespace mirevo {
 struct ResultTable {
   std::vector<std::string> headLines;     ///< `#` lines before the header row, without "# "
   bool hasHeader = false;                 ///< there is a header row
-  bool hasExpectedColumns = false;        ///< with the columns that the reader expects
-  std::vector<ResultRow> rows;            ///< whole rows, in the order of the file; none where the columns are others
-  std::size_t rowsOfOtherColumns = 0;     ///< whole rows below a header row with other columns
+  bool hasExpectedCount = false;          ///< with as many columns as the reader expects
+  bool hasExpectedColumns = false;        ///< with those columns, by their names
+  std::vector<ResultRow> rows;            ///< whole rows, in the order of the file; none where the count is another
+  std::size_t rowsOfOtherColumns = 0;     ///< whole rows below a header row with another count
   std::vector<std::string> closingLines;  ///< `#` lines behind the header row, without "# "
   std::size_t unusableLines = 0;          ///< rows that were cut off or damaged
 };

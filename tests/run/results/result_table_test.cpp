@@ -49,12 +49,17 @@ TEST(ResultTable, AFileCutAtAnyByteHoldsItsWholeRowsAndNoOther) {
 }
 
 TEST(ResultTable, OtherColumnsAreToldFromNone) {
-  for (const char* header : {"Evaluation\tStatus\tX2\tRMSE\tAggregate\n", "Evaluation\tStatus\tX1\tAggregate\n"}) {
-    const ResultTable table = readResultTable(std::string(header) + "1\tOK\t1\t2\t3\n2\tOK\t1\t2\n", kColumns);
+  const struct {
+    std::string header;
+    std::size_t rows;
+    std::size_t others;
+  } cases[] = {{"Evaluation\tStatus\tX2\tRMSE\tAggregate\n", 1, 0}, {"Evaluation\tStatus\tX1\tAggregate\n", 0, 1}};
+  for (const auto& c : cases) {
+    const ResultTable table = readResultTable(c.header + "1\tOK\t1\t2\t3\n2\tOK\t1\t2\n", kColumns);
     EXPECT_TRUE(table.hasHeader);
     EXPECT_FALSE(table.hasExpectedColumns);
-    EXPECT_EQ(table.rows.size(), 0U);
-    EXPECT_EQ(table.rowsOfOtherColumns, 1U);
+    EXPECT_EQ(table.rows.size(), c.rows);
+    EXPECT_EQ(table.rowsOfOtherColumns, c.others);
     EXPECT_EQ(table.unusableLines, 1U);
   }
   EXPECT_TRUE(readResultTable("Evaluation\tStatus\tX1 \t RMSE\tAggregate\n", kColumns).hasExpectedColumns);
