@@ -66,15 +66,13 @@ TEST(ConvertIdTemplate, ReplacesIdValues) {
 }
 
 TEST(ConvertIdTemplate, RefusesUndefinedIdValues) {
-  const std::tuple<const char*, const char*> cases[] = {
-      {"x 2.0E-035", "2.0E-035"},
-      {"see table-35", "table-35"},
-      {"e-35", "e-35"},
-      {"x 1e-35,1.5E-35", "1e-35,1.5E-35"},
-      {"1e-35,1.5e-35", "!,1.5e-35"},
-      {"x 99999999999e-35", "99999999999e-35"},
-      {"x k=1e-35", "k=1e-35"},
-  };
+  const std::tuple<const char*, const char*> cases[] = {{"x 2.0E-035", "2.0E-035"},
+                                                        {"see table-35", "table-35"},
+                                                        {"e-35", "e-35"},
+                                                        {"x 1e-35,1.5E-35", "1e-35,1.5E-35"},
+                                                        {"1e-35,1.5e-35", "!,1.5e-35"},
+                                                        {"x 99999999999e-35", "99999999999e-35"},
+                                                        {"x k=1e-35", "k=1e-35"}};
   for (const auto& [line, token] : cases) {
     EXPECT_THAT(refusalOf([&] { converted(std::string("first line\n") + line); }),
                 StartsWith(std::string("Error: Undefined parameter ID value ") + token +

@@ -150,10 +150,10 @@ TEST(Dds, RefusesImpossibleInputWithAStatus) {
   UniformGenerator random(1);
   const double huge = std::numeric_limits<double>::max();
   const std::pair<SearchBounds, int> cases[] = {{{}, 10},
-                                                {box(2, 0.0, 1.0), 0},
+                                                {box(2, 0, 1), 0},
                                                 {{{0.0}, {1.0, 2.0}, {0.0}}, 10},
-                                                {box(1, 1.0, 0.0), 10},
-                                                {box(1, kNaN, 1.0), 10},
+                                                {box(1, 1, 0), 10},
+                                                {box(1, kNaN, 1), 10},
                                                 {box(1, -huge, huge), 10},
                                                 {{{0.0}, {1.0}, {}}, 10}};
   for (const auto& [bounds, budget] : cases) {
