@@ -42,34 +42,19 @@ TEST(LocalSensitivity, OfALinearModelGivesTheCovarianceOfItsClosedForm) {
   EXPECT_EQ(results.rows[1][2], "4");
   EXPECT_EQ(results.rows[3][2], "4.02");
 
-  // simulated = a + b sin(t / 58) + ...; the observations have a = 5, b = 2, the base set a = 4, b = 1.
-  double s = 0.0;
-  double ss = 0.0;
-  double squares = 0.0;
-  for (int t = 0; t < 365; ++t) {
-    const double sine = std::sin(t / 58.0);
-    s += sine;
-    ss += sine * sine;
-    squares += (1.0 + sine) * (1.0 + sine);
-  }
-  const double variance = squares / 363.0;
-  const double determinant = 365.0 * ss - s * s;
-  const double deviationA = std::sqrt(variance * ss / determinant);
-  const double deviationB = std::sqrt(variance * 365.0 / determinant);
-  const double t = 1.966521;  // 97.5 % quantile of Student's t with 363 degrees of freedom
+  // By hand: simulated = a + b sin(t / 58), residuals of a - 5 = -1 and b - 2 = -1, (X'X)^-1 of the columns 1 and
+  // sin(t / 58) over t = 0 ... 364, Student's t of 363 degrees of freedom 1.966521.
   const auto a = reportRow(results, "Parameter (model scale)", "a");
   const auto b = reportRow(results, "Parameter (model scale)", "b");
   ASSERT_EQ(a.size(), 4U);
   ASSERT_EQ(b.size(), 4U);
-  EXPECT_NEAR(a[1] / deviationA, 1.0, 2e-5);
-  EXPECT_NEAR(b[1] / deviationB, 1.0, 2e-5);
-  EXPECT_NEAR(a[2], 4.0 - t * deviationA, 1e-4);
-  EXPECT_NEAR(b[3], 1.0 + t * deviationB, 1e-4);
-  EXPECT_NEAR(reportRow(results, "Correlation", "a")[1], -s / std::sqrt(365.0 * ss), 1e-4);
-  EXPECT_NEAR(reportRow(results, "Covariance", "b")[0], -variance * s / determinant, 1e-7);
-  // d RMSE / da = mean(-1 - sine) / RMSE
-  const double rmse = std::sqrt(squares / 365.0);
-  EXPECT_NEAR(reportRow(results, "Derivatives of objective functions", "a")[0], -(1.0 + s / 365.0) / rmse, 1e-4);
+  EXPECT_NEAR(a[1] / 0.06426530, 1.0, 2e-5);
+  EXPECT_NEAR(b[1] / 0.09095656, 1.0, 2e-5);
+  EXPECT_NEAR(a[2], 3.873621, 1e-4);
+  EXPECT_NEAR(b[3], 1.178868, 1e-4);
+  EXPECT_NEAR(reportRow(results, "Correlation", "a")[1], 0.000008, 1e-4);
+  EXPECT_NEAR(reportRow(results, "Covariance", "b")[0], 0.000000048, 1e-7);
+  EXPECT_NEAR(reportRow(results, "Derivatives of objective functions", "a")[0], -0.816710, 1e-4);
   EXPECT_THAT(results.comments, Contains(HasSubstr("1. a")));
 
   EXPECT_THAT(folder.read("basin.log"), HasSubstr("\nParameter covariance: 365 observations, 2 parameters, 363 "));

@@ -40,10 +40,7 @@ std::string converted(const std::string& line) {
 }
 
 TEST(ConvertIdTemplate, ReplacesIdValues) {
-  const struct {
-    const char* line;
-    const char* expected;
-  } cases[] = {
+  const std::tuple<const char*, const char*> cases[] = {
       {"no value here   ", "no value here"},
       {"x 1E-35 y", "x !K        ! y"},
       {"x 1.0E-035", "x !K        !"},
@@ -94,10 +91,7 @@ TEST(ConvertIdTemplate, KeepsLinesAndEndsThemAlike) {
 
 TEST(ParameterTemplate, FillsPlaceholders) {
   const std::vector<double> values{12.5, 0, 1, 1e100, 5, 7};
-  const struct {
-    const char* text;
-    const char* expected;
-  } cases[] = {
+  const std::tuple<const char*, const char*> cases[] = {
       {"$\nplain   \n", "plain\n"},
       {"$", ""},
       {"$ is the delimiter\n$K    $", "   12.5\n"},
