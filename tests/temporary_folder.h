@@ -39,8 +39,9 @@ class TemporaryFolder {
   }
 
   /// The content of a file, "<no file>" when there is none.
-  std::string read(const std::string& name) const {
-    std::ifstream file(*this / name, std::ios::binary);
+  std::string read(const std::string& name) const { return readFile(*this / name); }
+  static std::string readFile(const std::string& path) {
+    std::ifstream file(path, std::ios::binary);
     if (!file) return "<no file>";
     std::ostringstream content;
     content << file.rdbuf();

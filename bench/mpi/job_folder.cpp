@@ -17,7 +17,7 @@ int main(int argc, char** argv) {
   mirevo::testing::RunSettings settings{.option = 0};
   const int runs = std::atoi(argv[2]);
   for (int i = 1; i <= runs; ++i) settings.scenarios.push_back(fmt::format("{}, {}, 1", i % 10, i % 5));
-  settings.modelArguments = fmt::format("--steps 10 --sleep-ms {}", argv[3]);
+  settings.modelArguments = fmt::format("--sleep-ms {}", argv[3]);
   folder.writeSetup(settings);
   std::filesystem::copy(folder.path(), argv[1],
                         std::filesystem::copy_options::recursive | std::filesystem::copy_options::overwrite_existing);

@@ -35,12 +35,6 @@ inline double rosenbrock(const std::vector<double>& x) {
   return sum;
 }
 
-inline double sixHumpCamelBack(const std::vector<double>& x) {
-  const double a = x[0] * x[0];
-  const double b = x[1] * x[1];
-  return (4.0 - 2.1 * a + a * a / 3.0) * a + x[0] * x[1] + (-4.0 + 4.0 * b) * b;
-}
-
 inline double rastrigin(const std::vector<double>& x) {
   double sum = 10.0 * static_cast<double>(x.size());
   for (const double value : x) sum += value * value - 10.0 * std::cos(2.0 * std::numbers::pi * value);
@@ -68,23 +62,6 @@ inline double ackley(const std::vector<double>& x) {
   return -20.0 * std::exp(-0.2 * std::sqrt(squares / n)) - std::exp(cosines / n) + 20.0 + std::numbers::e;
 }
 
-inline double hartman6(const std::vector<double>& x) {
-  static constexpr double a[4][6] = {
-      {10, 3, 17, 3.5, 1.7, 8}, {0.05, 10, 17, 0.1, 8, 14}, {3, 3.5, 1.7, 10, 17, 8}, {17, 8, 0.05, 10, 0.1, 14}};
-  static constexpr double c[4] = {1.0, 1.2, 3.0, 3.2};
-  static constexpr double p[4][6] = {{0.1312, 0.1696, 0.5569, 0.0124, 0.8283, 0.5886},
-                                     {0.2329, 0.4135, 0.8307, 0.3736, 0.1004, 0.9991},
-                                     {0.2348, 0.1451, 0.3522, 0.2883, 0.3047, 0.6650},
-                                     {0.4047, 0.8828, 0.8732, 0.5743, 0.1091, 0.0381}};
-  double sum = 0.0;
-  for (std::size_t i = 0; i < 4; ++i) {
-    double exponent = 0.0;
-    for (std::size_t j = 0; j < 6; ++j) exponent += a[i][j] * (x[j] - p[i][j]) * (x[j] - p[i][j]);
-    sum -= c[i] * std::exp(-exponent);
-  }
-  return sum;
-}
-
 inline TestFunction cube(std::string name, std::size_t n, double lower, double upper, double optimum,
                          double optimalValue, std::function<double(const std::vector<double>&)> value) {
   return {std::move(name),
@@ -98,14 +75,7 @@ inline TestFunction cube(std::string name, std::size_t n, double lower, double u
 inline std::vector<TestFunction> testFunctions() {
   return {
       {"Rosenbrock 2-D", {-5, -2}, {5, 8}, {1, 1}, 0.0, rosenbrock},
-      {"Six-hump camel-back 2-D", {-5, -5}, {5, 5}, {0.08984201, -0.71265640}, -1.03162845, sixHumpCamelBack},
       cube("Griewank 2-D", 2, -600, 600, 0, 0.0, [](const auto& x) { return griewank(x, 200.0); }),
-      {"Hartman 6-D",
-       {0, 0, 0, 0, 0, 0},
-       {1, 1, 1, 1, 1, 1},
-       {0.20168952, 0.15001069, 0.47687398, 0.27533243, 0.31165162, 0.65730054},
-       -3.32236801,
-       hartman6},
       cube("Ackley 10-D", 10, -32.768, 32.768, 0, 0.0, ackley),
       cube("Rastrigin 10-D", 10, -5.12, 5.12, 0, 0.0, rastrigin),
   };

@@ -85,22 +85,19 @@ TEST_F(ModelRunTest, MeasureFileValuesAreTakenByTheirNumber) {
   folder_.write("base/out/keep", "");
   makeRunner(launcher_, 1);
   const std::string file = folder_ / "run_Process1/out/measures.txt";
-  const struct {
-    std::string content;
-    std::string reason;
-  } cases[] = {{"7 8.5 # rms and bias", ""},
-               {"7\n", file + ": expected at least 2 numbers, found 1"},
-               {"7\n8.x\n", file + ":2"},
-               {"", file + ": expected at least 2 numbers, found 0"}};
-  for (const auto& c : cases) {
-    writes("out/measures.txt", c.content);
+  const std::pair<std::string, std::string> cases[] = {{"7 8.5 # rms and bias", ""},
+                                                       {"7\n", file + ": expected at least 2 numbers, found 1"},
+                                                       {"7\n8.x\n", file + ":2"},
+                                                       {"", file + ": expected at least 2 numbers, found 0"}};
+  for (const auto& [content, reason] : cases) {
+    writes("out/measures.txt", content);
     const EvaluationResult result = evaluate(2.0);
-    EXPECT_EQ(result.ok(), c.reason.empty()) << c.content;
+    EXPECT_EQ(result.ok(), reason.empty()) << content;
     if (result.ok()) {
       EXPECT_THAT(result.measureValues, ElementsAre(8.5));
     } else {
       EXPECT_EQ(result.failure->kind, Kind::resultsNotReadable);
-      EXPECT_THAT(result.failure->reason, testing::StartsWith(c.reason));
+      EXPECT_THAT(result.failure->reason, testing::StartsWith(reason));
     }
   }
   batch_.write = nullptr;

@@ -43,4 +43,16 @@ class FaultReport {
   int failedCount_ = 0;
 };
 
+/// Makes the program's system calls fail one after the other: in the long form all of them on files that are rarely
+/// used and a spread of those on the others, each with the errors that it may meet; in the short form one call a kind
+/// of file.
+void tryInjectedFaults(bool isLong, FaultReport& report);
+
+/// Runs that are stopped, killed, or see the clock move.
+void tryInterruptions(bool isLong, FaultReport& report);
+
+/// Faults as the system itself makes them: full disks, forbidden files, limits of a process, files removed during the
+/// run. What needs rights that this process does not have is reported as skipped.
+void tryRealFaults(bool isLong, FaultReport& report);
+
 }  // namespace mirevo::testing

@@ -19,13 +19,6 @@ const std::vector<std::string>& earlierFiles() {
 }
 constexpr std::size_t kKeptEarlierFiles = 10;
 
-std::string readFile(const fs::path& path) {
-  std::ifstream file(path, std::ios::binary);
-  std::ostringstream content;
-  content << file.rdbuf();
-  return content.str();
-}
-
 std::string excerpt(const std::string& text) {
   return text.size() < 600 ? text : text.substr(0, 300) + " ... " + text.substr(text.size() - 300);
 }
@@ -54,16 +47,12 @@ std::map<int, std::string> rowsOf(const std::string& text, std::string& torn) {
 
 }  // namespace
 
-FaultyRun::FaultyRun(RunSettings settings, bool restarts, const std::string& modelScript)
-    : restarts_(restarts), marker_(folder_.path()) {
-  if (!modelScript.empty()) folder_.write("model/run.sh", modelScript, 0755);
+FaultyRun::FaultyRun(const RunSettings& settings, const std::string& script)
+    : restarts_(settings.restart != 0), resultFileName_(settings.resultFile()), marker_(folder_.path()) {
+  folder_.useScript(script);
   folder_.write("model/data/table.txt", std::string(20'000, 'x'));
   fs::create_symlink("data/table.txt", folder_ / "model/link");
   folder_.writeSetup(settings);
-  if (restarts) folder_.editSetup("    Title = ", "    Restart = 1\n    Title = ");
-  resultFileName_ = settings.option == 2   ? "basin_Optimisation.dat"
-                    : settings.option == 1 ? "basin_Sensitivity.dat"
-                                           : "basin.dat";
   for (const auto& entry : fs::directory_iterator(path())) inputs_.insert(entry.path().filename());
 }
 
@@ -130,7 +119,8 @@ std::map<std::string, std::string> FaultyRun::outputs() const {
   }
   if (!folder_.exists("basin_Saved")) return found;
   for (const auto& entry : fs::recursive_directory_iterator(folder_ / "basin_Saved")) {
-    if (entry.is_regular_file()) found[entry.path().lexically_relative(path())] = readFile(entry.path());
+    if (entry.is_regular_file())
+      found[entry.path().lexically_relative(path())] = TemporaryFolder::readFile(entry.path());
   }
   return found;
 }
@@ -187,6 +177,11 @@ std::vector<std::string> FaultyRun::checkRows(const Expectation& expected) const
   for (const auto& [number, row] : rows) {
     const auto found = wanted.find(number);
     if (found != wanted.end() && found->second == row) continue;
+    // An aggregate that the sample's end settles is not known before.
+    const auto aggregate = row.rfind("\tNaN\n");
+    if (aggregate != std::string::npos && found != wanted.end() &&
+        found->second.starts_with(row.substr(0, aggregate + 1)))
+      continue;
     if (expected.mayFailEvaluation && row.find("\tFAILED\t") != std::string::npos) {
       if (resultFileName_ == "basin_Optimisation.dat") break;  // a search goes another way from here
       continue;
@@ -219,12 +214,13 @@ std::vector<std::string> FaultyRun::checkProcesses() const {
     for (const auto& entry : fs::directory_iterator("/proc")) {
       const std::string id = entry.path().filename();
       if (id.find_first_not_of("0123456789") != std::string::npos || !isRunning(std::atoi(id.c_str()))) continue;
-      const std::string environment = readFile(entry.path() / "environ");
-      if (environment.find("FAULT_RUN=" + marker_) != std::string::npos) names += readFile(entry.path() / "comm");
+      const std::string environment = TemporaryFolder::readFile(entry.path() / "environ");
+      if (environment.find("FAULT_RUN=" + marker_) != std::string::npos)
+        names += TemporaryFolder::readFile(entry.path() / "comm");
     }
     return names.empty();
   };
-  if (waitUntil(noneIsLeft, 3.0)) return {};
+  if (waitUntil(noneIsLeft, 20.0)) return {};
   return {"processes are left: " + names};
 }
 
@@ -242,7 +238,7 @@ std::vector<std::string> FaultyRun::checkOutputs() const {
 std::vector<std::string> FaultyRun::checkEarlierFiles() const {
   std::set<std::string> contents;
   for (const auto& entry : fs::recursive_directory_iterator(path())) {
-    if (entry.is_regular_file() && entry.file_size() < 100) contents.insert(readFile(entry.path()));
+    if (entry.is_regular_file() && entry.file_size() < 100) contents.insert(TemporaryFolder::readFile(entry.path()));
   }
   std::vector<std::string> problems;
   for (std::size_t i = 0; i < kKeptEarlierFiles; ++i) {

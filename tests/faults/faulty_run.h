@@ -29,8 +29,8 @@ class FaultyRun {
  public:
   using Environment = RunningProgram::Environment;
 
-  /// With `restarts` every run of the setup goes on from what the one before has left.
-  explicit FaultyRun(RunSettings settings, bool restarts = false, const std::string& modelScript = {});
+  /// The model's script with `script` before the model proper.
+  explicit FaultyRun(const RunSettings& settings, const std::string& script = {});
 
   const std::string& path() const { return folder_.path(); }
   const ModelFolder& folder() const { return folder_; }

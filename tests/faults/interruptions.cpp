@@ -1,21 +1,33 @@
-#include "faults/interruptions.h"
-
 #include <algorithm>
 #include <random>
+#include <span>
 
+#include "faults/fault_report.h"
 #include "faults/faulty_run.h"
 
 namespace mirevo::testing {
 namespace {
 
-RunSettings settingsOf(int option) {
-  RunSettings settings{.option = option, .maxEvaluations = option == 2 ? 12 : 10};
-  if (option == 0) {
-    settings.scenarios = {"1, 1, 1", "2, 1, 1", "3, 1, 1", "9, 1, 1", "4, 1, 1",
-                          "5, 1, 1", "6, 1, 1", "2, 2, 1", "3, 2, 1", "4, 2, 1"};
-    settings.slots = 3;
-    settings.modelArguments = "--fail-above 8";
-  }
+/// Every task and search, with failed runs and slots, and an aggregate that is settled by the sample.
+const RunSettings kRuns[] = {
+    {.option = 0,
+     .scenarios = {"1, 1, 1", "2, 1, 1", "3, 1, 1", "9, 1, 1", "4, 1, 1", "5, 1, 1", "6, 1, 1", "2, 2, 1", "3, 2, 1",
+                   "4, 2, 1"},
+     .slots = 3,
+     .modelArguments = "--fail-above 8"},
+    {.option = 1},
+    {.maxEvaluations = 12},
+    {.option = 3, .maxEvaluations = 10},
+    {.algorithm = 0, .aggregation = 1, .maxEvaluations = 40, .modelArguments = "--fail-above 9"},
+    {.algorithm = 1, .usesSurrogate = true, .aggregation = 1, .maxEvaluations = 45, .slots = 3},
+    {.includesInitial = false, .aggregation = 1, .maxEvaluations = 20, .savedFile = "model/simulated.csv"}};
+
+std::string nameOf(const RunSettings& settings) {
+  return fmt::format("option {}, algorithm {}", settings.option, settings.algorithm);
+}
+
+RunSettings restarting(RunSettings settings) {
+  settings.restart = 1;
   return settings;
 }
 
@@ -24,14 +36,15 @@ void pauseMilliseconds(int milliseconds) {
   ::nanosleep(&pause, nullptr);
 }
 
-/// Killed before a system call on its files that is drawn at random; with `restarts` the next run goes on from there,
-/// and is itself killed every second time.
-void tryKills(int option, bool restarts, int count, FaultReport& report) {
-  FaultyRun run(settingsOf(option), restarts);
+/// Killed before a system call on its files that is drawn at random; where runs restart the next one goes on from
+/// there, and is itself killed every second time.
+void tryKills(const RunSettings& settings, int count, FaultReport& report) {
+  FaultyRun run(settings);
+  const bool restarts = settings.restart != 0;
   const TemporaryFolder records;
   run.makeReference(run.injection({{"FAULT_RECORD", records / "calls"}}));
   const std::string calls = records.read("calls");
-  std::mt19937 generator(static_cast<unsigned>(option));
+  std::mt19937 generator(static_cast<unsigned>(settings.option));
   const auto callCount = static_cast<unsigned long>(std::count(calls.begin(), calls.end(), '\n'));
   for (int i = 0; i < count && callCount > 0; ++i) {
     const unsigned long moment = 1 + generator() % callCount;
@@ -45,13 +58,13 @@ void tryKills(int option, bool restarts, int count, FaultReport& report) {
       problems.insert(problems.end(), more.begin(), more.end());
     }
     report.tried(restarts ? "killed and restarted" : "killed",
-                 fmt::format("option {}, before call {} of {}", option, moment, callCount), problems);
+                 fmt::format("{}, before call {} of {}", nameOf(settings), moment, callCount), problems);
   }
 }
 
 /// The result file ends anywhere in its last two rows, as a machine that loses power leaves it.
-void tryCuts(int option, bool isLong, FaultReport& report) {
-  FaultyRun run(settingsOf(option), true);
+void tryCuts(const RunSettings& settings, bool isLong, FaultReport& report) {
+  FaultyRun run(settings);
   run.makeReference();
   std::string whole = run.folder().read(run.resultFileName());
   // Up to the last row: closing lines are written by a run that ends orderly.
@@ -73,12 +86,12 @@ void tryCuts(int option, bool isLong, FaultReport& report) {
     if (log.find(fmt::format("Restart: {} evaluations are taken from", rows)) == std::string::npos) {
       problems.push_back(fmt::format("not all of the {} whole rows were taken up", rows));
     }
-    report.tried("result file cut", fmt::format("option {}, to {} of {} bytes", option, length, end), problems);
+    report.tried("result file cut", fmt::format("{}, to {} of {} bytes", nameOf(settings), length, end), problems);
   }
 }
 
 void tryStops(int count, FaultReport& report) {
-  FaultyRun run(settingsOf(2));
+  FaultyRun run(kRuns[2]);
   run.makeReference();
   for (int i = 0; i < count; ++i) {
     run.reset();
@@ -95,15 +108,15 @@ void tryStops(int count, FaultReport& report) {
 }
 
 void tryClocks(FaultReport& report) {
-  for (const int option : {0, 2}) {
-    FaultyRun run(settingsOf(option));
+  for (const RunSettings& settings : {kRuns[0], kRuns[2]}) {
+    FaultyRun run(settings);
     run.makeReference();
     for (const char* step : {"1", "3600", "-86400", "31557600", "2000000000"}) {
       run.reset();
       const ProgramResult result = run.run(run.injection({{"FAULT_CLOCK", step}}));
       auto problems = run.check(result, {.mayPassSilently = true});
       if (result.exitCode != 0) problems.push_back(fmt::format("exit code {}", result.exitCode));
-      report.tried("clock set back", fmt::format("option {}, by {} s at each look", option, step), problems);
+      report.tried("clock set back", fmt::format("{}, by {} s at each look", nameOf(settings), step), problems);
     }
   }
 }
@@ -111,10 +124,10 @@ void tryClocks(FaultReport& report) {
 }  // namespace
 
 void tryInterruptions(bool isLong, FaultReport& report) {
-  for (const int option : {0, 1, 2, 3}) {
-    tryKills(option, false, isLong ? 25 : 1, report);
-    tryKills(option, true, isLong ? 100 : 3, report);
-    tryCuts(option, isLong, report);
+  for (const RunSettings& settings : kRuns) tryKills(restarting(settings), isLong ? 100 : 3, report);
+  for (const RunSettings& settings : std::span(kRuns).first(4)) {
+    tryKills(settings, isLong ? 25 : 1, report);
+    tryCuts(restarting(settings), isLong, report);
   }
   tryStops(isLong ? 40 : 3, report);
   tryClocks(report);

@@ -6,18 +6,13 @@
 //   faults --long                every call and error, hundreds of interruptions (many minutes)
 //   faults [--long] GROUP ...    only these: injected, interruptions, real
 
-#include <algorithm>
 #include <cstdio>
-#include <iterator>
+#include <set>
 #include <string_view>
-#include <vector>
 
 #include <fmt/format.h>
 
 #include "faults/fault_report.h"
-#include "faults/injected_faults.h"
-#include "faults/interruptions.h"
-#include "faults/real_faults.h"
 
 int main(int argc, char** argv) {
   using mirevo::testing::FaultReport;
@@ -28,24 +23,13 @@ int main(int argc, char** argv) {
   constexpr Group kGroups[] = {{"injected", mirevo::testing::tryInjectedFaults},
                                {"interruptions", mirevo::testing::tryInterruptions},
                                {"real", mirevo::testing::tryRealFaults}};
-  bool isLong = false;
-  std::vector<std::string_view> wanted;
-  for (int i = 1; i < argc; ++i) {
-    const std::string_view argument = argv[i];
-    if (argument == "--long") {
-      isLong = true;
-    } else if (std::ranges::find(kGroups, argument, &Group::name) != std::end(kGroups)) {
-      wanted.push_back(argument);
-    } else {
-      fmt::print(stderr, "Usage: faults [--long] [injected] [interruptions] [real]\n");
-      return 2;
-    }
-  }
+  std::set<std::string_view> wanted(argv + 1, argv + argc);
+  const bool isLong = wanted.erase("--long") > 0;
   FaultReport report;
-  for (const Group& group : kGroups) {
-    bool isWanted = wanted.empty();
-    for (const std::string_view name : wanted) isWanted = isWanted || name == group.name;
-    if (isWanted) group.tryAll(isLong, report);
+  for (const bool isAll = wanted.empty(); const Group& group : kGroups) {
+    if (isAll || wanted.erase(group.name) > 0) group.tryAll(isLong, report);
   }
-  return report.finish();
+  if (wanted.empty()) return report.finish();
+  fmt::print(stderr, "Usage: faults [--long] [injected] [interruptions] [real]\n");
+  return 2;
 }

@@ -1,5 +1,3 @@
-#include "faults/real_faults.h"
-
 #include <cerrno>
 #include <cstring>
 #include <memory>
@@ -7,6 +5,7 @@
 #include <sys/mount.h>
 #include <sys/statfs.h>
 
+#include "faults/fault_report.h"
 #include "faults/faulty_run.h"
 
 namespace mirevo::testing {
@@ -215,10 +214,10 @@ void tryRemovedFiles(FaultReport& report) {
                              {"basin.log", nullptr, ""}};
   for (const Case& removal : kCases) {
     const TemporaryFolder outside;
-    FaultyRun run(RunSettings{.option = 2, .maxEvaluations = 6}, false,
-                  fmt::format("#!/bin/sh\necho >> {1}/count\n{0} \"$@\" || exit 1\n"
-                              "test -e {1}/armed && test `wc -l < {1}/count` -eq 3 && rm -rf \"`cat {1}/armed`\"\n"
-                              "exit 0\n",
+    FaultyRun run(RunSettings{.option = 2, .maxEvaluations = 6},
+                  fmt::format("echo >>{1}/count\n{0} \"$@\" || exit 1\n"
+                              "test -e {1}/armed && test `wc -l <{1}/count` -eq 3 && rm -rf \"`cat {1}/armed`\"\n"
+                              "exit 0",
                               MIREVO_TEST_MODEL, outside.path()));
     run.makeReference();
     fs::remove(outside / "count");

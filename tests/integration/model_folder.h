@@ -15,35 +15,41 @@ namespace mirevo::testing {
 struct RunSettings {
   int option = 2;
   int algorithm = 2;
-  int maxEvaluations = 40;  ///< also the sample size of an uncertainty analysis
-  int seed = 1;
+  bool usesSurrogate = false;
+  bool includesInitial = true;  ///< the initial set in a search's sample
+  int aggregation = 0;
+  int maxEvaluations = 40;                  ///< also the sample size of an uncertainty analysis
   std::vector<std::string> scenarios = {};  ///< values of a, b and c, "1, 2, 3"; none: a single run
   int slots = 1;
+  int restart = 0;
   std::string modelArguments = {};
   std::string batchFile = "model/run.sh";
-  std::string templateFile = "model/parameters.tpl";
-  std::string simulationFile = "model/simulated.csv";
-  std::string observationFile = "observed.csv";
   std::string savedFile = {};  ///< an output file that is kept of every evaluation; none when empty
   std::string processFolder = {};
+
+  const char* resultFile() const {
+    return option == 2 ? "basin_Optimisation.dat" : option == 1 ? "basin_Sensitivity.dat" : "basin.dat";
+  }
 };
+
+/// Scenarios with a from 0 to 9 and b from 0 to 4.
+inline std::vector<std::string> scenarios(int count) {
+  std::vector<std::string> values;
+  for (int i = 0; i < count; ++i) values.push_back(fmt::format("{}, {}, 1", 9.0 * i / count, 4.0 * i / count));
+  return values;
+}
 
 /// A folder with the model, its observations (made with a = 5, b = 2, c = 1) and a setup file `basin.kdx`. Parameters:
 /// `a` in [0, 10] from 4, `b` in [0, 5] from 1, `c` fixed at 1; one measure, the root mean square error.
 class ModelFolder : public TemporaryFolder {
  public:
   ModelFolder() {
-    write("model/run.sh", fmt::format("#!/bin/sh\nexec {} \"$@\"\n", MIREVO_TEST_MODEL), 0755);
+    useScript("");
     write("model/parameters.txt", "a = 5\nb = 2\nc = 1\n");
-    useTemplate("");
+    write("model/parameters.tpl", "!\na = !a              !\nb = !b              !\nc = !c              !\n");
     const std::string command = fmt::format("cd '{}/model' && ./run.sh && cp simulated.csv ..", path());
     if (std::system(command.c_str()) != 0) throw std::runtime_error("the test model does not run");
     std::filesystem::rename(*this / "simulated.csv", *this / "observed.csv");
-  }
-
-  /// The parameter file with further lines.
-  void useTemplate(const std::string& lines) const {
-    write("model/parameters.tpl", "!\na = !a              !\nb = !b              !\nc = !c              !\n" + lines);
   }
 
   /// Writes `basin.kdx` and returns its path.
@@ -52,6 +58,10 @@ class ModelFolder : public TemporaryFolder {
   int waitForProcess(const std::string& name) const {
     EXPECT_TRUE(waitUntil([&] { return exists(name) && read(name).ends_with("\n"); })) << read("basin.log");
     return std::atoi(read(name).c_str());
+  }
+  /// The model's script, with `lines` before the model proper.
+  void useScript(const std::string& lines) const {
+    write("model/run.sh", fmt::format("#!/bin/sh\n{}\nexec {} \"$@\"\n", lines, MIREVO_TEST_MODEL), 0755);
   }
   /// Replaces a text in `basin.kdx`, which must hold it.
   void editSetup(const std::string& from, const std::string& to) const {
@@ -71,15 +81,20 @@ class ModelFolder : public TemporaryFolder {
       scenarios += fmt::format("      [SCENARIO_{0}]\n        Parameters = {1}\n      [/SCENARIO_{0}]\n", i + 1,
                                settings.scenarios[i]);
     }
+    const std::string surrogate =
+        settings.usesSurrogate
+            ? "    Use_Surrogate_Model = 1\n    [SURROGATE_MODEL_PARAMETERS]\n      Neighbourhood_Size = "
+              "20\n      No_Initial_Generations = 2\n    [/SURROGATE_MODEL_PARAMETERS]\n"
+            : "    Use_Surrogate_Model = 0\n";
     const bool saves = !settings.savedFile.empty();
     const std::string savedFiles =
         fmt::format("    [OUTPUT_FILE_1]\n      File_name = '{}'\n    [/OUTPUT_FILE_1]\n", settings.savedFile);
     return fmt::format(
         fmt::runtime(form), fmt::arg("option", settings.option), fmt::arg("algorithm", settings.algorithm),
-        fmt::arg("maxEvaluations", settings.maxEvaluations), fmt::arg("seed", settings.seed),
-        fmt::arg("slots", settings.slots), fmt::arg("modelArguments", settings.modelArguments),
-        fmt::arg("batchFile", settings.batchFile), fmt::arg("templateFile", settings.templateFile),
-        fmt::arg("simulationFile", settings.simulationFile), fmt::arg("observationFile", settings.observationFile),
+        fmt::arg("surrogate", surrogate), fmt::arg("includesInitial", settings.includesInitial),
+        fmt::arg("aggregation", settings.aggregation), fmt::arg("maxEvaluations", settings.maxEvaluations),
+        fmt::arg("slots", settings.slots), fmt::arg("restart", settings.restart),
+        fmt::arg("modelArguments", settings.modelArguments), fmt::arg("batchFile", settings.batchFile),
         fmt::arg("processFolder", settings.processFolder), fmt::arg("savedCount", saves ? 1 : 0),
         fmt::arg("savedFiles", saves ? savedFiles : ""), fmt::arg("scenarioType", scenarios.empty() ? 0 : 1),
         fmt::arg("scenarioCount", settings.scenarios.size()), fmt::arg("scenarios", scenarios));

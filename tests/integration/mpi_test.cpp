@@ -1,5 +1,4 @@
 #include <algorithm>
-#include <chrono>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -30,17 +29,7 @@ class Mpi : public ::testing::Test {
   }
 
   static ProgramResult runJob(int processes, const std::vector<std::string>& arguments) {
-    return RunningProgram(mpirunArguments(processes, arguments), mpirunEnvironment(), "mpirun").wait();
-  }
-
-  /// The model as a shell script with `lines` before the model proper.
-  void useScript(const std::string& lines) const {
-    folder_.write("model/run.sh", fmt::format("#!/bin/sh\n{}\nexec {} \"$@\"\n", lines, MIREVO_TEST_MODEL));
-  }
-  static std::vector<std::string> scenarios(int count) {
-    std::vector<std::string> values;
-    for (int i = 0; i < count; ++i) values.push_back(fmt::format("{}, {}, 1", 0.45 * i, 0.2 * i));
-    return values;
+    return startJob(processes, arguments).wait();
   }
   /// The process folder with that number, relative to the test's; empty when there is none.
   std::string processFolder(const RunSettings& settings, int number) const {
@@ -53,43 +42,36 @@ class Mpi : public ::testing::Test {
   }
   std::string log() const { return folder_.read("basin.log"); }
 
-  static void expectGone(int process) {
-    EXPECT_GT(process, 0);
-    EXPECT_TRUE(waitUntil([&] { return !isRunning(process); }, 5.0)) << process;
-  }
-
   ModelFolder folder_;
 };
 
 TEST_F(Mpi, AJobWritesTheResultsOfAPlainRun) {
   const struct {
     RunSettings settings;
-    const char* results;
     int processes;
     int jobSlots = 1;  // what the setup has for the job, where it counts for nothing
   } cases[] = {
-      {{.maxEvaluations = 25}, "basin_Optimisation.dat", 2, 3},
-      {{.algorithm = 0, .maxEvaluations = 25}, "basin_Optimisation.dat", 3},
-      {{.algorithm = 1, .maxEvaluations = 25}, "basin_Optimisation.dat", 5},
-      {{.option = 3, .maxEvaluations = 15, .savedFile = "model/simulated.csv"}, "basin.dat", 3},
+      {{.maxEvaluations = 25}, 2, 3},
+      {{.algorithm = 0, .maxEvaluations = 25}, 3},
+      {{.algorithm = 1, .maxEvaluations = 25}, 5},
+      {{.option = 3, .maxEvaluations = 15, .savedFile = "model/simulated.csv"}, 3},
       // Two of them fail, which is as many as may.
       {{.option = 0, .scenarios = scenarios(20), .modelArguments = "--fail-above 8", .processFolder = "scratch/made"},
-       "basin.dat",
        3},
   };
-  useScript(fmt::format("{}\n{}", kSleepByParameters, kCountsJobVariables));
+  folder_.useScript(fmt::format("{}\n{}", kSleepByParameters, kCountsJobVariables));
   for (const auto& c : cases) {
     RunSettings settings = c.settings;
     const std::string setup = folder_.writeSetup(settings);
     ASSERT_EQ(runProgram({setup}).exitCode, 0) << log();
-    const std::string plain = folder_.read(c.results);
+    const std::string plain = folder_.read(settings.resultFile());
     settings.slots = c.jobSlots;
     folder_.writeSetup(settings);
     const std::string series = folder_.read("basin_Series.dat");
     const ProgramResult job = runJob(c.processes, {setup});
     EXPECT_EQ(job.exitCode, 0) << job.error << log();
     EXPECT_EQ(job.output + job.error, "");
-    EXPECT_EQ(withoutDates(folder_.read(c.results)), withoutDates(plain));
+    EXPECT_EQ(withoutDates(folder_.read(settings.resultFile())), withoutDates(plain));
     EXPECT_EQ(occurrences(log(), "NoSimultaneousSim: taken as 1 on each worker"), c.jobSlots > 1 ? 1 : 0);
     EXPECT_EQ(folder_.read("basin_Series.dat"), series);
     EXPECT_THAT(log(), HasSubstr(fmt::format("MPI job: this master and {} workers", c.processes - 1)));
@@ -139,7 +121,7 @@ TEST_F(Mpi, ASetupBesideItsModelIsRunByManyRanks) {
 }
 
 TEST_F(Mpi, AProcessAloneInItsJobIsAPlainRun) {
-  useScript(kCountsJobVariables);
+  folder_.useScript(kCountsJobVariables);
   const ProgramResult job = runJob(1, {folder_.writeSetup({.option = 0, .scenarios = scenarios(4), .slots = 2})});
   EXPECT_EQ(job.exitCode, 0) << job.error << log();
   EXPECT_THAT(log(), Not(HasSubstr("MPI")));
@@ -170,7 +152,7 @@ TEST_F(Mpi, AnErrorEndsTheJobWithItsMessageOnce) {
   };
   for (const Case& c : cases) {
     SCOPED_TRACE(c.what);
-    useScript(c.script);
+    folder_.useScript(c.script);
     const ProgramResult job = runJob(3, {folder_.writeSetup(c.settings)});
     EXPECT_EQ(job.exitCode, 1);
     EXPECT_FALSE(job.timedOut);
@@ -179,79 +161,39 @@ TEST_F(Mpi, AnErrorEndsTheJobWithItsMessageOnce) {
     EXPECT_THAT(log(), Not(HasSubstr("Termination request")));
     EXPECT_EQ(occurrences(job.error, c.message), 1) << job.error;
   }
+  EXPECT_EQ(occurrences(runJob(3, {"//qmon"}).error, "Usage: Mirevo kdx-file"), 1);
 }
 
-TEST_F(Mpi, MissingSetupIsSaidOnce) {
-  const ProgramResult job = runJob(3, {"//qmon"});
-  EXPECT_EQ(job.exitCode, 1);
-  EXPECT_EQ(occurrences(job.error, "Usage: Mirevo kdx-file"), 1) << job.error;
-}
-
-/// A job of three processes in which one worker's model hangs, ignores SIGTERM and has a child that does so, too.
-class HangingMpi : public Mpi {
- protected:
-  HangingMpi() {
-    useScript(
-        fmt::format("if mkdir '{0}/first' 2>/dev/null; then\n"
-                    "  echo $PPID > '{0}/worker.pid'\n  echo $$ > '{0}/model.pid'\n"
-                    "  exec {1} --sleep-ms 3600000 --ignore-term 1 --grandchild '{0}/grandchild.pid'\n"
-                    "fi",
-                    folder_.path(), MIREVO_TEST_MODEL));
-    setup_ = folder_.writeSetup({.option = 0, .scenarios = scenarios(12)});
-  }
-  /// Once this returns, all sets but one have been evaluated by the other worker.
-  void waitUntilOneIsLeft() {
-    model_ = folder_.waitForProcess("model.pid");
-    worker_ = folder_.waitForProcess("worker.pid");
-    grandchild_ = folder_.waitForProcess("grandchild.pid");
+/// Of a job of three processes one worker's model hangs, ignores SIGTERM and has a child that does so, too.
+TEST_F(Mpi, HoweverAJobIsEndedItLeavesNoProcess) {
+  const char* const pidFiles[] = {"worker.pid", "model.pid", "grandchild.pid"};
+  folder_.useScript(
+      fmt::format("if mkdir '{0}/first' 2>/dev/null; then\n"
+                  "  echo $PPID >'{0}/worker.pid'\n  echo $$ >'{0}/model.pid'\n"
+                  "  exec {1} --sleep-ms 3600000 --ignore-term 1 --grandchild '{0}/grandchild.pid'\n"
+                  "fi",
+                  folder_.path(), MIREVO_TEST_MODEL));
+  enum class Way { killFile, terminatedLauncher, killedWorker };
+  for (const Way way : {Way::killFile, Way::terminatedLauncher, Way::killedWorker}) {
+    RunningProgram job = startJob(3, {folder_.writeSetup({.option = 0, .scenarios = scenarios(12)})}, 6);
+    std::vector<int> processes;
+    for (const char* name : pidFiles) processes.push_back(folder_.waitForProcess(name));
+    // All sets but one have been evaluated by the other worker.
     EXPECT_TRUE(waitUntil([&] { return occurrences(log(), " completed: OK") == 11; })) << log();
-  }
-  void expectAllGone() {
-    for (const int process : {model_, worker_, grandchild_}) expectGone(process);
-  }
-
-  /// mpirun gives the ranks so many seconds between SIGTERM and SIGKILL; its own one is short for a busy machine.
-  static RunningProgram::Environment patientEnvironment() {
-    RunningProgram::Environment variables = mpirunEnvironment();
-    variables["OMPI_MCA_odls_base_sigkill_timeout"] = "3";
-    return variables;
-  }
-
-  std::string setup_;
-  int model_ = 0;
-  int worker_ = 0;
-  int grandchild_ = 0;
-};
-
-TEST_F(HangingMpi, AKillFileStopsEveryRankInFiveSeconds) {
-  RunningProgram job(mpirunArguments(3, {setup_}), mpirunEnvironment(), "mpirun");
-  waitUntilOneIsLeft();
-  const auto start = std::chrono::steady_clock::now();
-  folder_.write("basin._kill_", "");
-  EXPECT_TRUE(waitUntil([&] { return !isRunning(model_) && !isRunning(grandchild_); }, 10.0));
-  EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(5));
-  const ProgramResult result = job.wait(20.0);
-  EXPECT_EQ(result.exitCode, 1);
-  EXPECT_EQ(occurrences(result.error, "EM: Simulation cancelled"), 1) << result.error;
-  EXPECT_THAT(log(), HasSubstr("EM: Simulation cancelled\n"));
-  EXPECT_THAT(folder_.read("basin.dat"), HasSubstr("# EM: Simulation cancelled\n"));
-  EXPECT_EQ(readResults(folder_.read("basin.dat")).rows.size(), 12U);
-  expectAllGone();
-}
-
-TEST_F(HangingMpi, ATerminatedLauncherOrAKilledWorkerEndsTheJobAndLeavesNoProcess) {
-  for (const bool killsWorker : {false, true}) {
-    std::filesystem::remove(folder_ / "first");
-    for (const char* name : {"model.pid", "worker.pid", "grandchild.pid"}) std::filesystem::remove(folder_ / name);
-    RunningProgram job(mpirunArguments(3, {setup_}), patientEnvironment(), "mpirun");
-    waitUntilOneIsLeft();
-    killsWorker ? static_cast<void>(::kill(worker_, SIGKILL)) : job.send(SIGTERM);
-    const ProgramResult result = job.wait(20.0);
+    if (way == Way::killFile) folder_.write("basin._kill_", "");
+    if (way == Way::terminatedLauncher) job.send(SIGTERM);
+    if (way == Way::killedWorker) ::kill(processes.front(), SIGKILL);
+    const ProgramResult result = job.wait();
     EXPECT_FALSE(result.timedOut);
     EXPECT_NE(result.exitCode, 0);
-    EXPECT_THAT(log(), HasSubstr("\nTermination request\n"));
-    EXPECT_THAT(result.error, HasSubstr(killsWorker ? "signal 9" : ""));
-    expectAllGone();
+    const char* const message = way == Way::killFile ? "EM: Simulation cancelled" : "Termination request";
+    EXPECT_THAT(log(), HasSubstr(fmt::format("\n{}\n", message)));
+    EXPECT_THAT(folder_.read("basin.dat"), HasSubstr(fmt::format("# {}\n", message)));
+    EXPECT_EQ(readResults(folder_.read("basin.dat")).rows.size(), 12U);
+    EXPECT_THAT(result.error, HasSubstr(way == Way::killedWorker ? "signal 9" : message));
+    for (const int process : processes) EXPECT_TRUE(waitUntil([&] { return !isRunning(process); })) << process;
+    for (const char* name : pidFiles) std::filesystem::remove(folder_ / name);
+    std::filesystem::remove(folder_ / "first");
   }
 }
 

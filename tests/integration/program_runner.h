@@ -41,6 +41,7 @@ class RunningProgram {
   /// Lets this process, a child of the test, run the program instead.
   [[noreturn]] static void become(const char* program, const std::vector<std::string>& arguments,
                                   const Environment& environment) {
+    ::signal(SIGHUP, SIG_DFL);  // where the tests run under nohup
     for (const char* name : {"G48", "BUILDMODE", "VOLK_PROGRESS"}) ::unsetenv(name);
     for (const auto& [name, value] : environment) ::setenv(name.c_str(), value.c_str(), 1);
     std::vector<char*> argv{const_cast<char*>(program)};
@@ -57,7 +58,7 @@ class RunningProgram {
 
   void send(int signal) const { ::kill(process_, signal); }
 
-  ProgramResult wait(double seconds = 60.0) {
+  ProgramResult wait(double seconds = 100.0) {
     ProgramResult result;
     const int watched = static_cast<int>(::syscall(SYS_pidfd_open, process_, 0));
     pollfd ended{watched, POLLIN, 0};

@@ -1,3 +1,5 @@
+#include <tuple>
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -26,43 +28,34 @@ ProgramResult makeReport(const ModelFolder& folder, const std::string& setup = "
 }
 
 TEST(Report, StandsBesideTheResultsHoweverARunEnds) {
-  const struct {
-    RunSettings settings;
-    const char* resultFile;
-    int exitCode;
-    std::vector<const char*> parts;
-  } cases[] = {
+  const std::tuple<RunSettings, int, std::vector<const char*>> cases[] = {
       {{.maxEvaluations = 30},
-       "basin_Optimisation.dat",
        0,
        {R"("state":"finished","message":"Optimisation terminated: Maximum number of)",
         R"("evaluations":31,"planned":31)", R"({"name":"b","kind":"variable")", R"("start":1,"best":)",
         R"("series":[{"measure":"flow")", R"("step":86400000)", R"("figures":{"initial":{"n":365,"nse":)",
         R"("initialNumber":1,"initialLabel":"initial parameters")"}},
       {{.option = 0, .scenarios = {"5, 2, 1", "1, 2, 1"}, .modelArguments = "--fail-above 4.5"},
-       "basin.dat",
        1,
        {R"("state":"failed","message":"Error: Unable to continue. No of failed)", R"("failed":1)",
         R"("failures":[{"reason":"run.sh exited with code 3","count":1,"example":"Evaluation 1: run.sh)",
         R"("series":[])"}},
       {{.option = 1},
-       "basin_Sensitivity.dat",
        0,
        {R"("task":"sensitivity")", R"("derivatives":[[)", R"("covariance":{"names":["a","b"],"estimate":[4,1])"}},
       {{.option = 3, .maxEvaluations = 20},
-       "basin.dat",
        0,
        {R"("band":[{"measure":"flow","count":365,"start":"2001-01-01T00:00:00","step":86400000,"observed":[5,)",
         R"("initialLabel":"first evaluation")"}},
   };
-  for (const auto& c : cases) {
+  for (const auto& [settings, exitCode, parts] : cases) {
     const ModelFolder folder;
-    EXPECT_EQ(runProgram({folder.writeSetup(c.settings)}).exitCode, c.exitCode);
+    EXPECT_EQ(runProgram({folder.writeSetup(settings)}).exitCode, exitCode);
     const std::string data = reportData(folder);
-    for (const char* part : c.parts) EXPECT_THAT(data, HasSubstr(part));
+    for (const char* part : parts) EXPECT_THAT(data, HasSubstr(part));
     // From the files alone the same comes out, but for the time of the report, whenever they were copied.
-    std::filesystem::last_write_time(folder / c.resultFile, {});
-    const std::string results = folder.read(c.resultFile);
+    std::filesystem::last_write_time(folder / settings.resultFile(), {});
+    const std::string results = folder.read(settings.resultFile());
     const std::string ended = results.substr(results.find("\n# Ended: ") + 10, 19);
     EXPECT_EQ(makeReport(folder).exitCode, 0);
     const std::string again = reportData(folder);
@@ -104,10 +97,7 @@ TEST(Report, SeriesAreThoseOfTheInitialAndTheBestEvaluationWhateverTheSlots) {
 
 TEST(Report, OfARunThatGoesOnOrWasCutOffSaysSoAndLeavesItsFilesAlone) {
   const ModelFolder folder;
-  folder.write("model/run.sh", fmt::format("#!/bin/sh\n"
-                                           "test -e first || {{ touch first; exec {0}; }}\n"
-                                           "exec {0} --sleep-ms 3600000\n",
-                                           MIREVO_TEST_MODEL));
+  folder.useScript("test -e first && set -- --sleep-ms 3600000; touch first");
   folder.writeSetup({.option = 0, .scenarios = {"1, 1, 1", "2, 2, 1"}});
   EXPECT_THAT(makeReport(folder).error, HasSubstr("basin.dat: No such file or directory"));
   folder.write("basin_Report.html", "of an earlier run");

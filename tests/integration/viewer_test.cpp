@@ -17,12 +17,9 @@ std::string runningRun() {
          "MESSAGEvaluation of parameter set No. 1 completed: OK\nMESSAGBest so far: 4.5 (evaluation 1)\nPROGRE12.5\n";
 }
 
-/// A model that takes its time: 200 evaluations of a tenth of a second.
+/// A run that takes its time: 2000 evaluations of a tenth of a second.
 RunSettings slowRun() {
-  RunSettings settings;
-  settings.maxEvaluations = 200;
-  settings.modelArguments = "--sleep-ms 100";
-  return settings;
+  return {.maxEvaluations = 2000, .modelArguments = "--sleep-ms 100"};
 }
 
 class ViewerTest : public ::testing::Test {
@@ -101,15 +98,13 @@ TEST_F(ViewerTest, AKillFileThatCannotBeMadeIsSaid) {
 }
 
 TEST_F(ViewerTest, StartedWithTheRunItEndsWithTheRunsExitCode) {
-  RunSettings settings;
-  settings.maxEvaluations = 5;
-  TerminalProgram good({MIREVO_PROGRAM, "//QMon", folder_.writeSetup(settings)}, {{"VOLK_PROGRESS", "NONE"}});
+  TerminalProgram good({MIREVO_PROGRAM, "//QMon", folder_.writeSetup({.maxEvaluations = 5})},
+                       {{"VOLK_PROGRESS", "NONE"}});
   EXPECT_EQ(good.wait(), 0);
   EXPECT_THAT(good.output(), HasSubstr("Normal termination"));
   EXPECT_THAT(folder_.read("basin.log"), HasSubstr("Normal termination"));
 
-  settings.modelArguments = "--exit-code 3";
-  TerminalProgram bad({MIREVO_PROGRAM, "//qmon", folder_.writeSetup(settings)});
+  TerminalProgram bad({MIREVO_PROGRAM, "//qmon", folder_.writeSetup({.modelArguments = "--fail-above 0"})});
   EXPECT_EQ(bad.wait(), 1);
   EXPECT_THAT(bad.output(), HasSubstr("No of failed simulations too high"));
   EXPECT_THAT(bad.output(), HasSubstr("exited with code 3"));  // a line that stands on standard error alone
@@ -127,7 +122,7 @@ TEST_F(ViewerTest, ARunOutlivesItsViewerUntouched) {
         Case{"crash", [](TerminalProgram& viewer) { ::kill(viewer.process(), SIGKILL); }, false}}) {
     SCOPED_TRACE(example.name);
     TerminalProgram viewer({MIREVO_PROGRAM, "//qmon", folder_.writeSetup(slowRun())});
-    ASSERT_TRUE(viewer.shows("of 201"));
+    ASSERT_TRUE(viewer.shows("of 2001"));
     const int process = runsProcess();
     example.part(viewer);
     EXPECT_EQ(viewer.wait(), std::string(example.name) == "crash" ? 128 + SIGKILL : 0);
@@ -148,7 +143,7 @@ TEST_F(ViewerTest, ARunOutlivesItsViewerUntouched) {
 
 TEST_F(ViewerTest, ControlCAsksUnderTheViewerAndYesCancels) {
   TerminalProgram viewer({MIREVO_PROGRAM, "//qmon", folder_.writeSetup(slowRun())});
-  ASSERT_TRUE(viewer.shows("of 201"));
+  ASSERT_TRUE(viewer.shows("of 2001"));
   viewer.type("\x03");
   ASSERT_TRUE(viewer.shows("Cancel the run?"));
   viewer.type("y");
@@ -163,7 +158,12 @@ TEST_F(ViewerTest, CancellingARunThatIsOnlyStartingLeavesAnotherRunAlone) {
   ASSERT_TRUE(reaches("basin._spi_", "COMSPD"));
   TerminalProgram viewer({MIREVO_PROGRAM, "//qmon", setup});
   ASSERT_TRUE(viewer.shows("The run is starting."));
+  // Its patience must not end while the keys are typed.
+  const int run =
+      std::atoi(TemporaryFolder::readFile(fmt::format("/proc/{0}/task/{0}/children", viewer.process())).c_str());
+  ::kill(run, SIGSTOP);
   cancelAndConfirm(viewer);
+  ::kill(run, SIGCONT);
   EXPECT_EQ(viewer.wait(), 128 + SIGTERM);
   EXPECT_THAT(viewer.output(), HasSubstr("Mirevo: Termination request"));
   EXPECT_FALSE(folder_.exists("basin._kill_"));
@@ -187,9 +187,7 @@ TEST_F(ViewerTest, ARunThatWasKilledIsFoundGone) {
 }
 
 TEST_F(ViewerTest, WithoutATerminalTheMessagesComeAsLines) {
-  RunSettings settings;
-  settings.maxEvaluations = 3;
-  const ProgramResult result = runProgram({"//qmon", folder_.writeSetup(settings)});
+  const ProgramResult result = runProgram({"//qmon", folder_.writeSetup({.maxEvaluations = 3})});
   EXPECT_EQ(result.exitCode, 0);
   EXPECT_THAT(result.output, HasSubstr("\nEvaluation of parameter set No. 2 completed: OK\nBest so far: "));
   EXPECT_THAT(result.output, ::testing::EndsWith("-- Normal termination\n"));

@@ -112,11 +112,9 @@ TEST(CheckConstraint, FollowsItsTable) {
   const struct {
     double left, right;
     bool violated[6];
-  } cases[] = {
-      {1, 2, {false, false, true, true, false, false}},
-      {2, 2, {true, false, true, false, false, false}},
-      {3, 2, {true, true, false, false, false, false}},
-  };
+  } cases[] = {{1, 2, {false, false, true, true, false, false}},
+               {2, 2, {true, false, true, false, false, false}},
+               {3, 2, {true, true, false, false, false, false}}};
   for (const auto& c : cases) {
     for (int i = 0; i < 6; ++i) {
       const auto logicalOperator = static_cast<LogicalOperator>(i == 5 ? -1 : i);

@@ -2,6 +2,7 @@
 
 #include <cmath>
 #include <limits>
+#include <tuple>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -76,11 +77,7 @@ TEST(BuildSearchSpace, TransformsTheVariableParametersInOrder) {
 
 TEST(BuildSearchSpace, RefusesInItsOrder) {
   constexpr auto kLog = TransformationType::logarithmic;
-  const struct {
-    std::vector<ModelParameter> parameters;
-    const char* message;
-  } cases[] = {
-      {{}, "Error: No variable model parameters defined"},
+  const std::tuple<std::vector<ModelParameter>, const char*> cases[] = {
       {{parameter("f", 1, 0, 2, kLog, ParameterType::fixed)}, "Error: No variable model parameters defined"},
       {{parameter("low ", -1, 0, 2)}, "Error: Initial parameter value smaller than lower bound for parameter low"},
       {{parameter("high", 3, 0, 2)}, "Error: Initial parameter value larger than upper bound for parameter high"},
@@ -92,6 +89,7 @@ TEST(BuildSearchSpace, RefusesInItsOrder) {
       {{parameter("first", 1, 0, 2, kLog), parameter("second", 3, 0, 2)},
        "Error: Invalid parameter transformation for parameter first"},
   };
+  EXPECT_EQ(refusalMessageOf([] { BuildSearchSpace({}); }), "Error: No variable model parameters defined");
   for (const auto& [parameters, message] : cases) {
     EXPECT_EQ(refusalMessageOf([&, &set = parameters] { BuildSearchSpace(set); }), message);
   }

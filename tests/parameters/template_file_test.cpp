@@ -40,10 +40,7 @@ std::string converted(const std::string& line) {
 }
 
 TEST(ConvertIdTemplate, ReplacesIdValues) {
-  const struct {
-    const char* line;
-    const char* expected;
-  } cases[] = {
+  const std::tuple<const char*, const char*> cases[] = {
       {"no value here   ", "no value here"},
       {"x 1E-35 y", "x !K        ! y"},
       {"x 1.0E-035", "x !K        !"},
@@ -66,15 +63,13 @@ TEST(ConvertIdTemplate, ReplacesIdValues) {
 }
 
 TEST(ConvertIdTemplate, RefusesUndefinedIdValues) {
-  const std::tuple<const char*, const char*> cases[] = {
-      {"x 2.0E-035", "2.0E-035"},
-      {"see table-35", "table-35"},
-      {"e-35", "e-35"},
-      {"x 1e-35,1.5E-35", "1e-35,1.5E-35"},
-      {"1e-35,1.5e-35", "!,1.5e-35"},
-      {"x 99999999999e-35", "99999999999e-35"},
-      {"x k=1e-35", "k=1e-35"},
-  };
+  const std::tuple<const char*, const char*> cases[] = {{"x 2.0E-035", "2.0E-035"},
+                                                        {"see table-35", "table-35"},
+                                                        {"e-35", "e-35"},
+                                                        {"x 1e-35,1.5E-35", "1e-35,1.5E-35"},
+                                                        {"1e-35,1.5e-35", "!,1.5e-35"},
+                                                        {"x 99999999999e-35", "99999999999e-35"},
+                                                        {"x k=1e-35", "k=1e-35"}};
   for (const auto& [line, token] : cases) {
     EXPECT_THAT(refusalOf([&] { converted(std::string("first line\n") + line); }),
                 StartsWith(std::string("Error: Undefined parameter ID value ") + token +
@@ -96,10 +91,7 @@ TEST(ConvertIdTemplate, KeepsLinesAndEndsThemAlike) {
 
 TEST(ParameterTemplate, FillsPlaceholders) {
   const std::vector<double> values{12.5, 0, 1, 1e100, 5, 7};
-  const struct {
-    const char* text;
-    const char* expected;
-  } cases[] = {
+  const std::tuple<const char*, const char*> cases[] = {
       {"$\nplain   \n", "plain\n"},
       {"$", ""},
       {"$ is the delimiter\n$K    $", "   12.5\n"},

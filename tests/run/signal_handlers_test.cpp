@@ -27,6 +27,7 @@ void actWithHandlers(const TemporaryFolder& folder, const char* buildMode, const
   const auto open = [&](const char* name) {
     return ::open((folder / name).c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_APPEND, 0666);
   };
+  for (const int signal : {SIGHUP, SIGQUIT}) ::signal(signal, SIG_DFL);  // where the tests run under nohup
   ::setenv("BUILDMODE", buildMode, 1);
   ::setenv("G48", frontEnd, 1);
   ::dup2(open("stdout"), STDOUT_FILENO);
@@ -85,6 +86,18 @@ TEST(SignalHandlers, TheReasonIsLoggedBeforeTheModelIsHalted) {
   };
   EXPECT_EXIT(actWithHandlers(folder, "", "WIN", haltWhileSayingSo), ::testing::ExitedWithCode(130), "");
   EXPECT_EQ(folder.read("run.log"), "\nControl-C send\nhalted\n");
+}
+
+TEST(SignalHandlers, ARunUnderNohupOutlivesItsTerminal) {
+  const TemporaryFolder folder;
+  const auto hangUp = [] {
+    for (const int signal : {SIGHUP, SIGQUIT}) {
+      ::signal(signal, SIG_IGN);
+      installSignalHandlers();
+      ::raise(signal);
+    }
+  };
+  EXPECT_EXIT(actWithHandlers(folder, "", "WIN", hangUp), ::testing::ExitedWithCode(0), "^$");
 }
 
 /// A library's thread must not take it either, as the kernel lets one do where the main thread does not.

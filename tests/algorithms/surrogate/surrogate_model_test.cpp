@@ -2,6 +2,7 @@
 
 #include <cmath>
 #include <limits>
+#include <tuple>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -198,23 +199,18 @@ TEST(ProposalSelector, FindsTheModelsMinimumInItsNeighbourhoodOnce) {
 }
 
 TEST(ProposalSelector, MovesAnIntegerParameterOfFewValuesEitherWay) {
-  for (const int type : {0, 1}) {
-    for (const int values : {2, 3}) {
-      for (const int wanted : {0, values - 1}) {
-        SCOPED_TRACE(testing::Message() << "type " << type << ", " << values << " values, wanted " << wanted);
-        const SearchBounds bounds{{0, 0}, {static_cast<double>(values), 1}, {0, 0}, {true, false}};
-        ProposalSelector selector({25, 18, SurrogateModelType{type}, 1}, bounds);
-        UniformGenerator random(1);
-        for (const auto& point : latinHypercube(18, 2, random)) {
-          const ParameterSet set{values * point[0], point[1]};
-          selector.note(set, resultOf(10.0 * std::abs(std::floor(set[0]) - wanted) + std::pow(set[1] - 0.3, 2)));
-        }
-        const std::vector<PredictedMinimum> minima =
-            selector.minima(std::vector<ParameterSet>{{values - 1.0 - wanted + 0.2, 0.8}});
-        ASSERT_EQ(minima.size(), 1u);
-        EXPECT_EQ(std::floor(minima.front().set[0]), wanted);
-      }
+  for (const auto& [type, values, wanted] :
+       {std::tuple{0, 2, 0}, {0, 2, 1}, {0, 3, 0}, {0, 3, 2}, {1, 2, 0}, {1, 2, 1}, {1, 3, 0}, {1, 3, 2}}) {
+    const SearchBounds bounds{{0, 0}, {static_cast<double>(values), 1}, {0, 0}, {true, false}};
+    ProposalSelector selector({25, 18, SurrogateModelType{type}, 1}, bounds);
+    UniformGenerator random(1);
+    for (const auto& point : latinHypercube(18, 2, random)) {
+      const ParameterSet set{values * point[0], point[1]};
+      selector.note(set, resultOf(10.0 * std::abs(std::floor(set[0]) - wanted) + std::pow(set[1] - 0.3, 2)));
     }
+    const auto minima = selector.minima(std::vector<ParameterSet>{{values - 1.0 - wanted + 0.2, 0.8}});
+    ASSERT_EQ(minima.size(), 1u);
+    EXPECT_EQ(std::floor(minima.front().set[0]), wanted) << "type " << type << ", " << values << " values";
   }
 }
 

@@ -4,6 +4,7 @@
 #include <limits>
 #include <locale>
 #include <sstream>
+#include <tuple>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -95,10 +96,7 @@ TEST_F(ExpressionEvaluatorTest, FindsNamesAndNotPartsOfThem) {
 }
 
 TEST_F(ExpressionEvaluatorTest, SaysWhatIsWrongAndWhere) {
-  const struct {
-    const char* equation;
-    const char* detail;
-  } cases[] = {
+  const std::tuple<const char*, const char*> cases[] = {
       {"", "column 1: the equation is empty"},
       {"1 +", "column 4: the equation ends where"},
       {"höhe höhe", "column 6: an operator is expected"},

@@ -1,6 +1,7 @@
 #include "platform/kdx/kdx.h"
 
 #include <tuple>
+#include <utility>
 
 #include <gtest/gtest.h>
 
@@ -24,10 +25,7 @@ KdxDocument parse(std::string_view text) {
 }
 
 TEST(Kdx, NamesTheFirstPlaceThatIsWrongAndWhatWasExpected) {
-  const struct {
-    std::string text;
-    const char* diagnosis;
-  } cases[] = {
+  const std::pair<std::string, const char*> cases[] = {
       {"[A]\n  Title  'x'\n[/A]", "2:10: expected '=' after keyword \"Title\""},
       {"[A]\nx =\n", "2:4: expected a value after '=', found the end of the line"},
       {"[A]\nx = // 3\n", "2:5: expected a value after '=', found the end of the line"},
@@ -54,7 +52,7 @@ TEST(Kdx, NamesTheFirstPlaceThatIsWrongAndWhatWasExpected) {
       {"", "valid"},
       {"[A][B][/B][/A]", "valid"},
   };
-  for (const auto& row : cases) EXPECT_EQ(diagnosis(row.text), row.diagnosis) << row.text;
+  for (const auto& [text, expected] : cases) EXPECT_EQ(diagnosis(text), expected) << text;
 }
 
 TEST(Kdx, ReadsEveryKindOfValueWithItsPlace) {

@@ -1,15 +1,17 @@
 #include "platform/processes/argument_text.h"
 
+#include <string>
+#include <tuple>
+#include <utility>
+#include <vector>
+
 #include <gtest/gtest.h>
 
 namespace mirevo {
 namespace {
 
 TEST(ArgumentText, SplitsAsAShellDoes) {
-  const struct {
-    const char* text;
-    std::vector<std::string> words;
-  } cases[] = {
+  const std::tuple<const char*, std::vector<std::string>> cases[] = {
       {"", {}},
       {"  \t ", {}},
       {"-q  in.txt\tout.txt ", {"-q", "in.txt", "out.txt"}},
@@ -21,27 +23,24 @@ TEST(ArgumentText, SplitsAsAShellDoes) {
       {R"('no \ escape')", {R"(no \ escape)"}},
       {"$HOME *.txt `ls` ~ # ; &", {"$HOME", "*.txt", "`ls`", "~", "#", ";", "&"}},
   };
-  for (const auto& c : cases) {
+  for (const auto& [text, expected] : cases) {
     std::string reason;
-    const auto words = splitArguments(c.text, reason);
-    ASSERT_TRUE(words.has_value()) << c.text << ": " << reason;
-    EXPECT_EQ(*words, c.words) << c.text;
+    const auto words = splitArguments(text, reason);
+    ASSERT_TRUE(words.has_value()) << text << ": " << reason;
+    EXPECT_EQ(*words, expected) << text;
   }
 }
 
 TEST(ArgumentText, SaysWhereAQuoteIsOpen) {
-  const struct {
-    const char* text;
-    const char* reason;
-  } cases[] = {
+  const std::pair<const char*, const char*> cases[] = {
       {"-a 'in.txt", "expected a closing ' for the one at character 4"},
       {"\"a\" \"b\\\"", "expected a closing \" for the one at character 5"},
       {"a\\", "expected a character after the backslash at the end"},
   };
-  for (const auto& c : cases) {
+  for (const auto& [text, expected] : cases) {
     std::string reason;
-    EXPECT_FALSE(splitArguments(c.text, reason).has_value()) << c.text;
-    EXPECT_EQ(reason, c.reason);
+    EXPECT_FALSE(splitArguments(text, reason).has_value()) << text;
+    EXPECT_EQ(reason, expected);
   }
 }
 

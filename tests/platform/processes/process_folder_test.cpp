@@ -1,7 +1,9 @@
 #include "platform/processes/process_folder.h"
 
 #include <fcntl.h>
+#include <iterator>
 #include <map>
+#include <sstream>
 #include <string>
 #include <sys/stat.h>
 #include <tuple>
@@ -91,45 +93,28 @@ TEST(ProcessFolder, LinksLeadWhereTheyShould) {
 TEST(ProcessFolder, NeverCopiesWhatRunsMake) {
   const TemporaryFolder folder;
   for (const char* setup : {"cal.kdx", "cal.1.kdx", "in/deep/cal.KDX"}) folder.write(setup, "");
-  const std::map<std::string, std::string> made{{"cal_Process2/big.dat", ""},  // of this run
+  const std::map<std::string, std::string> made{{"cal_Process2/big.dat", ""},
                                                 {"other_Process1/" + std::string(kBatchLogName), "of another setup's"},
                                                 {"cal.log", "Warning: early\nMirevo 1.2, started\n"},
                                                 {"cal.2.dat", "# Title\n# Mirevo 1.2\n"}};
-  const char* const madeByName[] = {"in/deep/cal_Saved/1/out.csv",
-                                    "cal_Saved/out.csv",
-                                    "cal_Saved.12/out.csv",
-                                    "cal_Failed17/run.sh",
-                                    "cal_Optimisation.dat",
-                                    "cal_Optimisation.3.dat",
-                                    "cal.1_Sensitivity.dat",
-                                    "cal_Band_2.csv",
-                                    "cal_Band_2.1.csv",
-                                    "cal_Report.html",
-                                    "cal_Series.dat",
-                                    "cal_Series.dat.tmp",
-                                    "calSimErr.dat.tmp",
-                                    "cal._spi_",
-                                    "calSimErr.1.dat"};
-  const char* const mine[] = {"run.sh",
-                              "my_Process1/data.txt" /* no batch log */,
-                              "cal_Processes/data.txt",
-                              "cal_Saved.old/data.txt",
-                              "my_Saved/data.txt" /* no setup of that name */,
-                              "cal_Failed/run.sh",
-                              "cal_Optimisation.old.dat",
-                              "cal.dat.tmp",
-                              "cal.dat",
-                              "cal.1.log" /* by their content */,
-                              "cal.txt",
-                              "in/calSimErr.dat" /* no setup beside it */};
+  std::istringstream madeByName(
+      "in/deep/cal_Saved/1/out.csv cal_Saved/out.csv cal_Saved.12/out.csv cal_Failed17/run.sh cal_Optimisation.dat "
+      "cal_Optimisation.3.dat cal.1_Sensitivity.dat cal_Band_2.csv cal_Band_2.1.csv cal_Report.html cal_Series.dat "
+      "cal_Series.dat.tmp calSimErr.dat.tmp cal._spi_ calSimErr.1.dat");
+  // Folders without a batch log or a setup of their name, names that runs do not give, files by their content.
+  std::istringstream ours(
+      "run.sh my_Process1/data.txt cal_Processes/data.txt cal_Saved.old/data.txt my_Saved/data.txt cal_Failed/run.sh "
+      "cal_Optimisation.old.dat cal.dat.tmp cal.dat cal.1.log cal.txt in/calSimErr.dat");
+  const std::vector<std::string> left(std::istream_iterator<std::string>(madeByName), {});
+  const std::vector<std::string> copied(std::istream_iterator<std::string>(ours), {});
   for (const auto& [name, content] : made) folder.write(name, content);
-  for (const char* name : madeByName) folder.write(name, "");
-  for (const char* name : mine) folder.write(name, name == std::string("cal.txt") ? "Mirevo " : "initial storages\n");
+  for (const std::string& name : left) folder.write(name, "");
+  for (const std::string& name : copied) folder.write(name, name == "cal.txt" ? "Mirevo " : "initial storages\n");
   for (int round = 0; round < 2; ++round)
     makeProcessFolder(folder.path(), folder / "cal_Process1", folder / "cal_Process");
   for (const auto& [name, content] : made) EXPECT_FALSE(folder.exists("cal_Process1/" + name)) << name;
-  for (const std::string name : madeByName) EXPECT_FALSE(folder.exists("cal_Process1/" + name)) << name;
-  for (const std::string name : mine) EXPECT_TRUE(folder.exists("cal_Process1/" + name)) << name;
+  for (const std::string& name : left) EXPECT_FALSE(folder.exists("cal_Process1/" + name)) << name;
+  for (const std::string& name : copied) EXPECT_TRUE(folder.exists("cal_Process1/" + name)) << name;
   EXPECT_FALSE(folder.exists("cal_Process1/cal_Process1"));
   EXPECT_FALSE(folder.exists("cal_Process1/other_Process1"));
 }

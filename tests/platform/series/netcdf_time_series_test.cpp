@@ -187,17 +187,9 @@ TEST(NetcdfTimeSeries, FilesThatAreNoneOrCutOffAreRefused) {
   EXPECT_EQ(series.lastError(), "no_such_folder/q.nc: opening: No such file or directory");
   NetcdfFile file("cut.nc");
   file.writeFlow({0, 1, 2, 3});
-  int refused = 0;
-  for (auto length = std::filesystem::file_size(file.path()); length > 97; length -= 97) {
-    std::filesystem::resize_file(file.path(), length - 97);
-    if (!series.open(file.path())) {
-      ++refused;
-      EXPECT_THAT(series.lastError(), ::testing::StartsWith(file.path() + ": "));
-    } else if (series.itemCount() > 0) {
-      series.getData(1);
-    }
-  }
-  EXPECT_GT(refused, 10);
+  std::filesystem::resize_file(file.path(), std::filesystem::file_size(file.path()) / 2);
+  EXPECT_FALSE(series.open(file.path()));
+  EXPECT_THAT(series.lastError(), ::testing::StartsWith(file.path() + ": "));
 }
 
 // The library reads zeros beyond the end of a classic file: a run that stopped half-way would count as a good one.
