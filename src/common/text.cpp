@@ -5,7 +5,7 @@
 #include <cmath>
 #include <numeric>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 namespace mirevo {
 namespace {

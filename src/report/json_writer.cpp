@@ -3,7 +3,7 @@
 #include <cmath>
 #include <iterator>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 namespace mirevo {
 namespace {

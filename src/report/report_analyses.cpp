@@ -4,7 +4,7 @@
 #include <cmath>
 #include <map>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "algorithms/analyses/local_sensitivity.h"
 #include "common/calendar.h"

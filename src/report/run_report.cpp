@@ -10,7 +10,7 @@
 #include <utility>
 #include <variant>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/calendar.h"
 #include "common/clock.h"
@@ -403,6 +403,10 @@ std::optional<ReportData> buildReport(const RunConfig& config, const std::string
 bool writeReport(const RunConfig& config, const std::string& filePrefix, const std::optional<RunEnding>& ending,
                  std::string& reason) noexcept {
   try {
+    if (reportPageTemplate().empty()) {
+      reason = "this build has no report page (it was configured with MIREVO_REPORT_PAGE=OFF)";
+      return false;
+    }
     const std::optional<ReportData> data = buildReport(config, filePrefix, ending, reason);
     if (!data) return false;
     const std::string path = reportPath(filePrefix);

@@ -4,7 +4,7 @@
 #include <cmath>
 #include <initializer_list>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "viewer/course_plot.h"
 

@@ -3,7 +3,7 @@
 #include <algorithm>
 #include <numeric>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "algorithms/numbers/uniform_generator.h"
 

@@ -6,7 +6,7 @@
 #include <stdexcept>
 #include <utility>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "algorithms/searches/pse.h"
 #include "algorithms/searches/sce.h"

@@ -8,7 +8,7 @@
 #include <unistd.h>
 #include <utility>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/fatal_error.h"
 #include "common/file_copy.h"

@@ -4,7 +4,7 @@
 #include <iterator>
 #include <utility>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/fatal_error.h"
 #include "common/files.h"

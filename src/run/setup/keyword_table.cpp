@@ -5,7 +5,7 @@
 #include <type_traits>
 #include <unordered_map>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/text.h"
 

@@ -6,7 +6,7 @@
 #include <filesystem>
 #include <unordered_map>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "algorithms/surrogate/proposal_selector.h"
 #include "common/fatal_error.h"

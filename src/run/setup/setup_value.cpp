@@ -2,7 +2,7 @@
 
 #include <cassert>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/text.h"
 #include "platform/kdx/kdx_value.h"

@@ -3,7 +3,7 @@
 #include <algorithm>
 #include <cmath>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "algorithms/analyses/local_sensitivity.h"
 #include "algorithms/surrogate/quadratic_surrogate.h"

@@ -7,7 +7,7 @@
 #include <span>
 #include <utility>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "algorithms/analyses/covariance.h"
 #include "algorithms/analyses/local_sensitivity.h"

@@ -1,6 +1,6 @@
 #include "run/tasks/tasks.h"
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "algorithms/numbers/uniform_generator.h"
 #include "common/fatal_error.h"
