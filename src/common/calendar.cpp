@@ -1,6 +1,6 @@
 #include "common/calendar.h"
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/take_text.h"
 

@@ -5,7 +5,7 @@
 #include <cmath>
 #include <numeric>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/utf8.h"
 

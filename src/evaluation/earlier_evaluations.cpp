@@ -4,7 +4,7 @@
 #include <cstdint>
 #include <utility>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/fatal_error.h"
 #include "common/text.h"

@@ -1,6 +1,6 @@
 #include "evaluation/failed_run_policy.h"
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/fatal_error.h"
 

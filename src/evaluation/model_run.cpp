@@ -10,7 +10,7 @@
 #include <utility>
 #include <variant>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/calendar.h"
 #include "common/fatal_error.h"

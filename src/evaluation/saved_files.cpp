@@ -9,7 +9,7 @@
 #include <system_error>
 #include <utility>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/file_copy.h"
 #include "common/text.h"

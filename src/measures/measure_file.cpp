@@ -2,7 +2,7 @@
 
 #include <algorithm>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/files.h"
 #include "common/text.h"

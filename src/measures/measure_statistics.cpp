@@ -5,7 +5,7 @@
 #include <span>
 #include <string>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/calendar.h"
 #include "common/fatal_error.h"

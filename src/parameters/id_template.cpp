@@ -5,7 +5,7 @@
 #include <limits>
 #include <optional>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/fatal_error.h"
 #include "common/text.h"

@@ -6,7 +6,7 @@
 #include <cstring>
 #include <sys/stat.h>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/fatal_error.h"
 #include "common/files.h"

@@ -1,6 +1,6 @@
 #include "parameters/template_lines.h"
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/fatal_error.h"
 #include "common/text.h"

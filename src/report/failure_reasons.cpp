@@ -3,7 +3,7 @@
 #include <algorithm>
 #include <unordered_map>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/text.h"
 

@@ -3,7 +3,7 @@
 #include <cmath>
 #include <iterator>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/utf8.h"
 

@@ -5,7 +5,7 @@
 #include <limits>
 #include <map>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "algorithms/analyses/local_sensitivity.h"
 #include "common/calendar.h"

@@ -2,6 +2,8 @@
 
 #include <algorithm>
 
+#include <fmt/core.h>
+
 #include "common/calendar.h"
 #include "measures/fit_figures.h"
 #include "report/json_writer.h"

@@ -3,7 +3,7 @@
 #include <exception>
 #include <string_view>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/fatal_error.h"
 #include "common/run_files.h"

@@ -8,7 +8,7 @@
 #include <utility>
 #include <vector>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/calendar.h"
 #include "common/clock.h"
@@ -240,6 +240,10 @@ std::optional<ReportData> buildReport(const RunConfig& config, const std::string
 
 bool writeReport(const RunConfig& config, const std::string& filePrefix, std::string& reason) noexcept {
   try {
+    if (reportPageTemplate().empty()) {
+      reason = "this build has no report page (it was configured with MIREVO_REPORT_PAGE=OFF)";
+      return false;
+    }
     const std::optional<ReportData> data = buildReport(config, filePrefix, reason);
     if (!data) return false;
     const std::string path = runFilePath(filePrefix, run_files::kReport);

@@ -7,10 +7,10 @@
 #include <string>
 #include <unistd.h>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/version.h"
-#include "platform/jobs/mpi_session.h"
+#include "platform/jobs/job_launcher.h"
 #include "platform/terminal/front_end.h"
 #include "run/run_driver.h"
 #include "run/signal_handlers.h"

@@ -4,7 +4,7 @@
 #include <new>
 #include <unistd.h>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/calendar.h"
 #include "common/clock.h"
@@ -15,12 +15,13 @@
 #include "common/text.h"
 #include "common/version.h"
 #include "evaluation/local_evaluator.h"
-#include "evaluation/ranks/mpi_evaluator.h"
+#include "evaluation/ranks/rank_evaluator.h"
 #include "measures/period_series.h"
 #include "platform/processes/posix_process_launcher.h"
 #include "platform/signals/signal_state.h"
 #include "platform/terminal/front_end.h"
 #include "report/run_report.h"
+#include "run/job_end.h"
 #include "run/results/record_file.h"
 #include "run/run_model.h"
 #include "run/setup/setup_reader.h"
@@ -34,10 +35,6 @@ namespace mirevo {
 namespace {
 
 using progress::kNormalTermination;
-/// For all workers to have ended their models, which may take a grace time and a kill.
-constexpr double kWorkerStopSeconds = 20.0;
-/// At the end of a task, when a worker that was not needed may still be copying a large base folder.
-constexpr double kWorkerPatienceSeconds = 600.0;
 constexpr double kPatienceSeconds = 3.0;  ///< for an earlier run of the setup that is just ending
 
 std::string environmentValue(const char* name) {
@@ -56,16 +53,16 @@ RunDriver::~RunDriver() {
 
 int RunDriver::run(const std::string& setupFileName) {
   try {
-    startMpi();
-    if (state_.mpiRank > 0) return runWorker(state_.mpi);
+    startJob();
+    if (state_.mpiRank > 0) return runWorker(*state_.job);
     openRun(setupFileName);
     const std::string setupText = readSetupText(setupFileName);
-    config_ = readSetup(setupFileName, setupText, state_.log, state_.mpiInUse);
+    config_ = readSetup(setupFileName, setupText, state_.log, state_.job->hasWorkers());
     buildModel();
     logSetup();
     openResults();
     // Not before earlier results have been renamed: where they lie in the base folder, workers look at them.
-    if (state_.mpiInUse) beginWorkers(state_.mpi, {config_.setupFile, setupText});
+    beginWorkers(*state_.job, {config_.setupFile, setupText});
     state_.progress.writeMessage(std::string(progress::kTitle) + config_.title);
     state_.progress.writeStatus(config_.taskDescription());
     state_.progress.progressEvaluationLabel(config_.plannedModelRuns());
@@ -83,11 +80,11 @@ int RunDriver::run(const std::string& setupFileName) {
   }
 }
 
-void RunDriver::startMpi() {
-  state_.mpi.start();
-  state_.mpiRank = state_.mpi.rank();
-  state_.mpiProcessCount = state_.mpi.processCount();
-  state_.mpiInUse = state_.mpi.inUse();
+void RunDriver::startJob() {
+  state_.job = joinJob();
+  state_.mpiRank = state_.job->rank();
+  state_.mpiProcessCount = state_.job->processCount();
+  state_.mpiInUse = state_.job->hasWorkers();
 }
 
 void RunDriver::openRun(const std::string& setupFileName) {
@@ -135,7 +132,7 @@ void RunDriver::buildModel() {
   if (config_.task) config_.task->earlierSearches = results_->earlierSearches();
   launcher_ = std::make_unique<PosixProcessLauncher>();
   signalState.haltProcesses = haltProcessesFromSignal;
-  const int slotCount = state_.mpiInUse ? 0 : config_.simultaneousSimulations;  // the master runs no model
+  const int slotCount = state_.job->hasWorkers() ? 0 : config_.simultaneousSimulations;  // the master runs no model
   LauncherSettings settings = launcherSettings(config_, slotCount);
   settings.isCancelled = [this] {  // copies of a large model take their time
     if (!state_.progress.isCancelled()) return false;
@@ -157,9 +154,9 @@ void RunDriver::logSetup() {
       state_.log.warning(text);
     }
   }
-  if (state_.mpiInUse) {
-    state_.log.line(fmt::format("MPI job: this master and {} workers, each of which runs one model at a time",
-                                state_.mpiProcessCount - 1));
+  if (state_.job->hasWorkers()) {
+    state_.log.line(fmt::format("{} job: this master and {} workers, each of which runs one model at a time",
+                                state_.job->means(), state_.job->processCount() - 1));
   }
   state_.log.line("");
 }
@@ -174,8 +171,8 @@ void RunDriver::openResults() {
   openSeries();
   failedRunPolicy_.emplace(config_.plannedEvaluations(), config_.failedRunFolders);
   EarlierEvaluations* const earlier = results_->earlierEvaluations();
-  if (state_.mpiInUse) {
-    evaluator_ = std::make_unique<MpiEvaluator>(*runner_, state_.mpi, *reporter_, *failedRunPolicy_, earlier);
+  if (state_.job->hasWorkers()) {
+    evaluator_ = std::make_unique<RankEvaluator>(*runner_, *state_.job, *reporter_, *failedRunPolicy_, earlier);
   } else {
     evaluator_ = std::make_unique<LocalEvaluator>(*runner_, *reporter_, *failedRunPolicy_,
                                                   config_.simultaneousSimulations, earlier);
@@ -314,7 +311,7 @@ void RunDriver::finish(const TaskOutcome& outcome) {
     fatalError("Error: Unable to write to " + state_.log.path(), state_.log.writeError());
   }
   signalState.runLogDescriptor = -1;
-  leaveJob(0, kNormalTermination);
+  leaveJob(state_, 0, kNormalTermination);
   state_.log.close();
   if (!state_.log.writeError().empty()) {
     showMessage(fmt::format("Warning: The end of {} may be missing: {}", state_.log.path(), state_.log.writeError()));
@@ -361,7 +358,7 @@ int RunDriver::endEarly(std::string_view ending) {
   signalState.runLogDescriptor = -1;
   state_.log.close();
   if (launcher_) launcher_->haltProcesses();
-  leaveJob(1, ending);
+  leaveJob(state_, 1, ending);
   endProgress(ending);
   return 1;
 }
@@ -369,27 +366,6 @@ int RunDriver::endEarly(std::string_view ending) {
 void RunDriver::endProgress(std::string_view ending) {
   state_.progress.progressEnd(ending);
   if (const std::string problem = state_.progress.takeProblem(); !problem.empty()) showMessage("Warning: " + problem);
-}
-
-void RunDriver::leaveJob(int exitCode, std::string_view ending) {
-  if (!state_.mpiInUse) return;
-  std::string reason = "a worker did not answer the request to stop";
-  const auto warn = [this, exitCode](const std::string& text) {
-    if (exitCode != 0) return;  // the run has failed already, with the first reason
-    state_.log.warning(text);
-    showMessage("Warning: " + text, {}, MessageType::warning);
-  };
-  try {
-    if (stopWorkers(state_.mpi, exitCode == 0 ? kWorkerPatienceSeconds : kWorkerStopSeconds, warn)) {
-      state_.mpi.finalise(kWorkerStopSeconds);
-      return;
-    }
-  } catch (const FatalError& error) {
-    reason = error.message() + "\n" + error.detail();
-  }
-  showMessage("Warning: All processes of the MPI job are aborted: " + reason, {}, MessageType::warning);
-  state_.progress.progressEnd(ending);
-  state_.mpi.abort(exitCode);
 }
 
 }  // namespace mirevo

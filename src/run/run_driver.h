@@ -49,10 +49,9 @@ class RunDriver final {
     std::string reason;
   };
 
-  /// Settles the run's rank in its job: -1 and a plain local run without MPI or alone in its job. Throws FatalError
-  /// when a job launcher started several processes that MPI cannot bring together, as they would all write the same
-  /// files.
-  void startMpi();
+  /// Settles this process's part in the run's job. Throws FatalError when a job launcher started several processes that
+  /// cannot be brought together, as they would all write the same files.
+  void startJob();
   void openRun(const std::string& setupFileName);
   void buildModel();
   void logSetup();
@@ -71,10 +70,8 @@ class RunDriver final {
   void logFailures();
   int endInError(std::string_view message, std::string_view detail);
   int endCancelled(std::string_view message);
-  /// Log closed, model processes halted, MPI job left, progress ended.
+  /// Log closed, model processes halted, job left, progress ended.
   int endEarly(std::string_view ending);
-  /// On an MPI master: stops the workers and finalises MPI; ends the whole job when that is not possible.
-  void leaveJob(int exitCode, std::string_view ending);
   void endProgress(std::string_view ending);
   std::vector<std::string> closingLines(const Ending& ending) const;
 

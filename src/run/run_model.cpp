@@ -6,7 +6,7 @@
 #include <string_view>
 #include <system_error>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/run_files.h"
 #include "common/text.h"

@@ -5,7 +5,7 @@
 #include <fcntl.h>
 #include <unistd.h>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "platform/signals/signal_state.h"
 #include "platform/terminal/front_end.h"

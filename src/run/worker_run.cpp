@@ -3,10 +3,10 @@
 #include <new>
 #include <optional>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/fatal_error.h"
-#include "evaluation/ranks/mpi_worker.h"
+#include "evaluation/ranks/rank_worker.h"
 #include "parameters/parameter_model.h"
 #include "platform/processes/posix_process_launcher.h"
 #include "platform/signals/signal_state.h"
@@ -22,8 +22,8 @@ namespace {
 constexpr double kFarewellSeconds = 30.0;
 
 /// Works until the master says stop; when this returns, the model's processes are gone.
-void work(MpiSession& mpi) {
-  const auto begin = awaitBegin(mpi);
+void work(Job& job) {
+  const auto begin = awaitBegin(job);
   if (!begin) return;
   RunLog unread;  // the master's log has all of it
   const RunConfig config = readSetup(begin->setupFile, begin->text, unread, true);
@@ -31,38 +31,39 @@ void work(MpiSession& mpi) {
   ObjectiveAggregator aggregator(config.objectives, config.aggregationMethod);
   PosixProcessLauncher launcher;
   signalState.haltProcesses = haltProcessesFromSignal;
-  ModelRunner runner(describeModel(config), parameters, aggregator, launcher, launcherSettings(config, 1, mpi.rank()));
-  runWorkerLoop(mpi, runner);
+  ModelRunner runner(describeModel(config), parameters, aggregator, launcher, launcherSettings(config, 1, job.rank()));
+  runWorkerLoop(job, runner);
 }
 
-void workOrReport(MpiSession& mpi) {
+void workOrReport(Job& job) {
   try {
-    work(mpi);
+    work(job);
   } catch (const FatalError& error) {
-    reportFailure(mpi, {error.message(), error.detail()});
+    reportFailure(job, {error.message(), error.detail()});
   } catch (const std::bad_alloc&) {
-    reportFailure(mpi, {"Error: Unable to allocate memory", {}});
+    reportFailure(job, {"Error: Unable to allocate memory", {}});
   } catch (const std::exception& error) {
-    reportFailure(mpi, {"Error: Unexpected failure", error.what()});
+    reportFailure(job, {"Error: Unexpected failure", error.what()});
   }
 }
 
 }  // namespace
 
-int runWorker(MpiSession& mpi) {
+int runWorker(Job& job) {
   installSignalHandlers();
   // The master says it once for all of them.
   signalState.showsMessageBox = false;
   signalState.writesStandardOutput = false;
   try {
-    workOrReport(mpi);
-    sayFarewell(mpi);
-    mpi.finalise(kFarewellSeconds);
+    workOrReport(job);
+    sayFarewell(job);
+    job.finalise(kFarewellSeconds);
     return 0;
   } catch (const FatalError& error) {
     // Nobody can be told any more but whoever reads this.
-    showMessage(fmt::format("Worker {}: {}\n{}", mpi.rank(), error.message(), error.detail()));
-    mpi.abort(1);
+    showMessage(fmt::format("Worker {}: {}\n{}", job.rank(), error.message(), error.detail()));
+    job.abort(1);
+    return 1;
   }
 }
 

@@ -2,7 +2,7 @@
 #include <string>
 #include <unistd.h>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/run_files.h"
 #include "viewer/viewer.h"

@@ -9,7 +9,7 @@
 #include <signal.h>
 #include <unistd.h>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "platform/terminal/front_end.h"
 #include "platform/terminal/terminal.h"

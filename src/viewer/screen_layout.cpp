@@ -3,7 +3,7 @@
 #include <algorithm>
 #include <initializer_list>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "viewer/course_plot.h"
 

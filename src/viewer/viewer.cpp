@@ -10,7 +10,7 @@
 #include <signal.h>
 #include <unistd.h>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/clock.h"
 #include "common/run_files.h"

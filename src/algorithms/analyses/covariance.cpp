@@ -6,7 +6,7 @@
 #include <limits>
 
 #include <boost/math/distributions/students_t.hpp>
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "algorithms/numbers/lapack.h"
 #include "algorithms/numbers/sample_summary.h"

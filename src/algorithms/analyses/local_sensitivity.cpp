@@ -6,7 +6,7 @@
 #include <limits>
 #include <numeric>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/run_files.h"
 

@@ -5,7 +5,7 @@
 #include <numeric>
 #include <utility>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "algorithms/numbers/uniform_generator.h"
 #include "common/run_files.h"

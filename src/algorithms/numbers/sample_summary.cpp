@@ -5,7 +5,7 @@
 #include <limits>
 #include <utility>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/text.h"
 

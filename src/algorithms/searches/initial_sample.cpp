@@ -4,7 +4,7 @@
 #include <cmath>
 #include <optional>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "algorithms/numbers/latin_hypercube.h"
 #include "algorithms/numbers/sobol.h"

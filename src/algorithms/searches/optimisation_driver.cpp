@@ -3,7 +3,7 @@
 #include <new>
 #include <stdexcept>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/fatal_error.h"
 #include "common/text.h"

@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "common/fatal_error.h"
+#include "platform/jobs/job.h"
 
 namespace mirevo {
 namespace {
@@ -158,7 +159,7 @@ class Reader final {
     return taken;
   }
   [[noreturn]] static void refuse() {
-    fatalError("Error: MPI communication failed",
+    fatalError(kCommunicationFailed,
                "a message has another form than expected: do all processes of the job run the same Mirevo?");
   }
 

@@ -17,7 +17,7 @@ namespace mirevo {
 ///     | <-------------------- result   |
 ///     | keep folder ----------------> |  after a failed run, where its folder is evidence to keep
 ///     | stop ------------------------> |  at any time; ends its model's processes
-///     | <------------------ farewell   |  then both finalise MPI
+///     | <------------------ farewell   |  then both leave the job
 ///
 /// A worker that meets a fatal error sends `failure` at any time and waits for `stop`.
 enum class RankMessage : int { begin = 1, set, stop, ready, result, failure, farewell, keepFolder };

@@ -4,7 +4,7 @@
 #include <numbers>
 #include <optional>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/text.h"
 

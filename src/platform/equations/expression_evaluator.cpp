@@ -3,7 +3,7 @@
 #include <algorithm>
 #include <cassert>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 #include <muParser.h>
 
 #include "common/fatal_error.h"

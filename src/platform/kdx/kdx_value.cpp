@@ -2,7 +2,7 @@
 
 #include <optional>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/calendar.h"
 #include "common/take_text.h"

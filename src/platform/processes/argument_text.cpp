@@ -1,6 +1,6 @@
 #include "platform/processes/argument_text.h"
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 namespace mirevo {
 namespace {

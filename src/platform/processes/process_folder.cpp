@@ -14,7 +14,7 @@
 #include <unistd.h>
 #include <vector>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/descriptor.h"
 #include "common/fatal_error.h"

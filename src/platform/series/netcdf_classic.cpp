@@ -6,7 +6,7 @@
 #include <fstream>
 #include <vector>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 namespace mirevo {
 namespace {

@@ -4,7 +4,7 @@
 #include <limits>
 #include <optional>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 #include <netcdf.h>
 
 #include "common/calendar.h"

@@ -1,6 +1,6 @@
 #include "run/access/file_validation.h"
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/files.h"
 #include "common/paths.h"

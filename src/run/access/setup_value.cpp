@@ -3,7 +3,7 @@
 #include <algorithm>
 #include <cassert>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/calendar.h"
 #include "common/text.h"

@@ -7,7 +7,7 @@
 #include <unistd.h>
 #include <utility>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/descriptor_output.h"
 #include "common/progress_messages.h"

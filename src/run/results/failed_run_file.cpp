@@ -5,7 +5,7 @@
 #include <system_error>
 #include <utility>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/fatal_error.h"
 #include "common/files.h"

@@ -8,7 +8,7 @@
 #include <unistd.h>
 #include <utility>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/descriptor_output.h"
 #include "common/fatal_error.h"

@@ -7,7 +7,7 @@
 #include <unordered_map>
 #include <utility>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/checksum.h"
 #include "common/files.h"

@@ -3,7 +3,7 @@
 #include <set>
 #include <utility>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/clock.h"
 #include "common/fatal_error.h"

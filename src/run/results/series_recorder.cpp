@@ -5,7 +5,7 @@
 #include <exception>
 #include <utility>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/files.h"
 

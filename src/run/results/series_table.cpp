@@ -6,7 +6,7 @@
 #include <cmath>
 #include <limits>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/calendar.h"
 #include "common/data_table.h"

@@ -5,7 +5,7 @@
 #include <filesystem>
 #include <unordered_map>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/fatal_error.h"
 #include "common/files.h"

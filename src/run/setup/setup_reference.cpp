@@ -1,6 +1,6 @@
 #include "run/setup/setup_reference.h"
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "run/setup/run_keywords.h"
 

@@ -1,6 +1,6 @@
 #include "run/setup/setup_warnings.h"
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/text.h"
 #include "platform/equations/expression_evaluator.h"

@@ -1,6 +1,6 @@
 #include "run/setup/validation.h"
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/calendar.h"
 #include "common/fatal_error.h"

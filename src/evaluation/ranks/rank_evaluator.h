@@ -10,17 +10,17 @@
 #include "evaluation/failed_run_policy.h"
 #include "evaluation/model_run.h"
 #include "evaluation/ranks/rank_messages.h"
-#include "platform/jobs/message_channel.h"
+#include "platform/jobs/job.h"
 
 namespace mirevo {
 
-/// The master of an MPI job: hands one set at a time to whichever worker is free, the one of lowest rank first.
-class MpiEvaluator final : public Evaluator {
+/// The master of a job with workers: hands one set at a time to whichever worker is free, the one of lowest rank first.
+class RankEvaluator final : public Evaluator {
  public:
   /// `runner` has no slots here; it knows which sets cannot be run. The workers have been told to begin.
   /// `earlier`: evaluations that are not to be made again; may be null. All must outlive this.
-  MpiEvaluator(ModelRunner& runner, MessageChannel& channel, EvaluationObserver& observer, FailedRunPolicy& failedRuns,
-               EarlierEvaluations* earlier = nullptr);
+  RankEvaluator(ModelRunner& runner, Job& job, EvaluationObserver& observer, FailedRunPolicy& failedRuns,
+                EarlierEvaluations* earlier = nullptr);
 
   /// Throws FatalError with the worker's own message when one of them has met a fatal error.
   std::vector<EvaluationResult> evaluateParameterSets(std::span<const ParameterSet> sets, DispatchMode mode) override;
@@ -42,18 +42,18 @@ class MpiEvaluator final : public Evaluator {
   Worker& worker(int rank) { return workers_.at(static_cast<std::size_t>(rank - 1)); }
 
   ModelRunner& runner_;
-  MessageChannel& channel_;
+  Job& job_;
   EvaluationObserver& observer_;
   EvaluationLedger ledger_;
   std::vector<Worker> workers_;  ///< of rank 1, 2, ...
 };
 
-/// Tells every worker, in rank order, to begin with the setup.
-void beginWorkers(MessageChannel& channel, const BeginMessage& message);
+/// Tells every worker, in rank order, to begin with the setup. A job of one process has none.
+void beginWorkers(Job& job, const BeginMessage& message);
 
 /// Tells every worker, in rank order, to stop, and waits for their farewells. False when one has not answered within
 /// `seconds`. A worker may meet a fatal error after the last result was in, its base folder still being copied; `warn`
 /// is given a text for each. What else they still have to say is dropped.
-bool stopWorkers(MessageChannel& channel, double seconds, const std::function<void(const std::string&)>& warn);
+bool stopWorkers(Job& job, double seconds, const std::function<void(const std::string&)>& warn);
 
 }  // namespace mirevo

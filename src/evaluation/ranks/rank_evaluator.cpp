@@ -1,8 +1,8 @@
-#include "evaluation/ranks/mpi_evaluator.h"
+#include "evaluation/ranks/rank_evaluator.h"
 
 #include <utility>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/clock.h"
 #include "common/fatal_error.h"
@@ -13,26 +13,26 @@ namespace {
 /// Longest time between two looks at the cancellation; a message ends the wait.
 constexpr double kMasterPollSeconds = 0.5;
 
-void sendToWorkers(MessageChannel& channel, RankMessage tag, const std::string& content) {
-  for (int rank = 1; rank < channel.processCount(); ++rank) channel.send(rank, static_cast<int>(tag), content);
+void sendToWorkers(Job& job, RankMessage tag, const std::string& content) {
+  for (int rank = 1; rank < job.processCount(); ++rank) job.send(rank, static_cast<int>(tag), content);
 }
 
 }  // namespace
 
-MpiEvaluator::MpiEvaluator(ModelRunner& runner, MessageChannel& channel, EvaluationObserver& observer,
-                           FailedRunPolicy& failedRuns, EarlierEvaluations* earlier)
+RankEvaluator::RankEvaluator(ModelRunner& runner, Job& job, EvaluationObserver& observer, FailedRunPolicy& failedRuns,
+                             EarlierEvaluations* earlier)
     : runner_(runner),
-      channel_(channel),
+      job_(job),
       observer_(observer),
       ledger_(observer, failedRuns, earlier),
-      workers_(static_cast<std::size_t>(channel.processCount() - 1)) {}
+      workers_(static_cast<std::size_t>(job.processCount() - 1)) {}
 
-std::vector<EvaluationResult> MpiEvaluator::evaluateParameterSets(std::span<const ParameterSet> sets,
-                                                                  DispatchMode mode) {
+std::vector<EvaluationResult> RankEvaluator::evaluateParameterSets(std::span<const ParameterSet> sets,
+                                                                   DispatchMode mode) {
   ledger_.begin(sets, mode);
   startOnFreeWorkers();
   while (!ledger_.isComplete()) {
-    const auto message = channel_.receive(kMasterPollSeconds);
+    const auto message = job_.receive(kMasterPollSeconds);
     if (message) handle(*message);
     stopIfCancelled();
     startOnFreeWorkers();
@@ -40,19 +40,19 @@ std::vector<EvaluationResult> MpiEvaluator::evaluateParameterSets(std::span<cons
   return ledger_.end();
 }
 
-void MpiEvaluator::startOnFreeWorkers() {
-  for (int rank = 1; rank < channel_.processCount(); ++rank) {
+void RankEvaluator::startOnFreeWorkers() {
+  for (int rank = 1; rank < job_.processCount(); ++rank) {
     if (worker(rank).place && !worker(rank).set) startNext(rank);
   }
 }
 
-void MpiEvaluator::startNext(int rank) {
+void RankEvaluator::startNext(int rank) {
   while (const auto place = ledger_.takeNext()) {
     stopIfCancelled();
     auto failure = runner_.findUnrunnable(ledger_.set(*place));
     if (!failure) {
-      channel_.send(rank, static_cast<int>(RankMessage::set),
-                    encode(SetMessage{ledger_.numberOf(*place), ledger_.set(*place)}));
+      job_.send(rank, static_cast<int>(RankMessage::set),
+                encode(SetMessage{ledger_.numberOf(*place), ledger_.set(*place)}));
       worker(rank).set = *place;
       ledger_.markInitiated(*place);
       return;
@@ -61,7 +61,7 @@ void MpiEvaluator::startNext(int rank) {
   }
 }
 
-void MpiEvaluator::handle(const Message& message) {
+void RankEvaluator::handle(const Message& message) {
   switch (static_cast<RankMessage>(message.tag)) {
     case RankMessage::ready: {
       const ReadyMessage& place = worker(message.rank).place.emplace(decodeReady(message.content));
@@ -74,27 +74,26 @@ void MpiEvaluator::handle(const Message& message) {
     case RankMessage::failure:
       failWith(message.rank, decodeFailure(message.content));
     default:
-      fatalError("Error: MPI communication failed",
+      fatalError(kCommunicationFailed,
                  fmt::format("the worker with rank {} sent a message of unknown kind {}", message.rank, message.tag));
   }
 }
 
-void MpiEvaluator::takeResult(int rank, ResultMessage message) {
+void RankEvaluator::takeResult(int rank, ResultMessage message) {
   const auto place = std::exchange(worker(rank).set, std::nullopt);
   if (!place) {
-    fatalError("Error: MPI communication failed",
-               fmt::format("the worker with rank {} sent a result that nobody asked for", rank));
+    fatalError(kCommunicationFailed, fmt::format("the worker with rank {} sent a result that nobody asked for", rank));
   }
   EvaluationResult& result = message.result;
   // Only here is the transformation known that was settled by the initial sample.
   if (result.ok()) result.aggregate = runner_.aggregator().aggregate(result.objectiveValues);
   if (ledger_.isFolderWanted(result)) {
-    channel_.send(rank, static_cast<int>(RankMessage::keepFolder), encode(KeepFolderMessage{ledger_.numberOf(*place)}));
+    job_.send(rank, static_cast<int>(RankMessage::keepFolder), encode(KeepFolderMessage{ledger_.numberOf(*place)}));
   }
   ledger_.finish(*place, std::move(result), message.leftBehind);
 }
 
-void MpiEvaluator::failWith(int rank, const FailureMessage& failure) const {
+void RankEvaluator::failWith(int rank, const FailureMessage& failure) const {
   const auto& place = workers_.at(static_cast<std::size_t>(rank - 1)).place;
   std::string detail = failure.detail;
   if (!detail.empty()) detail += '\n';
@@ -102,27 +101,27 @@ void MpiEvaluator::failWith(int rank, const FailureMessage& failure) const {
   fatalError(failure.message, detail);
 }
 
-void MpiEvaluator::stopIfCancelled() {
+void RankEvaluator::stopIfCancelled() {
   constexpr const char* kCancelled = "EM: Simulation cancelled";
   if (!observer_.isCancelled()) return;
   observer_.message(kCancelled);
   throw RunCancelled(kCancelled);
 }
 
-void MpiEvaluator::settleAggregates(std::span<EvaluationResult> sample) {
+void RankEvaluator::settleAggregates(std::span<EvaluationResult> sample) {
   mirevo::settleAggregates(runner_.aggregator(), sample, observer_);
 }
 
-void beginWorkers(MessageChannel& channel, const BeginMessage& message) {
-  sendToWorkers(channel, RankMessage::begin, encode(message));
+void beginWorkers(Job& job, const BeginMessage& message) {
+  sendToWorkers(job, RankMessage::begin, encode(message));
 }
 
-bool stopWorkers(MessageChannel& channel, double seconds, const std::function<void(const std::string&)>& warn) {
-  sendToWorkers(channel, RankMessage::stop, {});
+bool stopWorkers(Job& job, double seconds, const std::function<void(const std::string&)>& warn) {
+  sendToWorkers(job, RankMessage::stop, {});
   const double deadline = runTimeClock() + seconds;
   int farewells = 0;
-  while (farewells < channel.processCount() - 1) {
-    const auto message = channel.receive(deadline - runTimeClock());
+  while (farewells < job.processCount() - 1) {
+    const auto message = job.receive(deadline - runTimeClock());
     if (!message) return false;
     if (message->tag == static_cast<int>(RankMessage::farewell)) ++farewells;
     if (message->tag == static_cast<int>(RankMessage::failure)) {

@@ -6,15 +6,23 @@
 #include <vector>
 
 #include "evaluation/ranks/rank_messages.h"
-#include "platform/jobs/message_channel.h"
+#include "platform/jobs/job.h"
 
 namespace mirevo {
 
-/// A channel to processes that are not there: notes what is sent, and delivers what the test has put into it.
-class FakeChannel final : public MessageChannel {
+/// The master's or a worker's part in a job whose other processes are not there: notes what is sent, and delivers what
+/// the test has put into it.
+class FakeJob final : public Job {
  public:
-  explicit FakeChannel(int processCount) : processCount_(processCount) {}
+  /// What aborting the job throws, as it must not return.
+  struct Aborted {
+    int exitCode;
+  };
 
+  explicit FakeJob(int processCount, int rank = 0) : processCount_(processCount), rank_(rank) {}
+
+  std::string_view means() const override { return "MPI"; }
+  int rank() const override { return rank_; }
   int processCount() const override { return processCount_; }
   void send(int rank, int tag, std::string content) override {
     sent.push_back({rank, tag, std::move(content)});
@@ -27,6 +35,8 @@ class FakeChannel final : public MessageChannel {
     arriving.pop_front();
     return message;
   }
+  void finalise(double) override { ++finalisations; }
+  void abort(int exitCode) override { throw Aborted{exitCode}; }
 
   void deliver(int rank, RankMessage tag, std::string content) {
     arriving.push_back({rank, static_cast<int>(tag), std::move(content)});
@@ -36,9 +46,11 @@ class FakeChannel final : public MessageChannel {
   std::deque<Message> arriving;
   std::function<void(const Message&)> onSend;
   std::function<void(double)> onReceive;
+  int finalisations = 0;
 
  private:
   int processCount_;
+  int rank_;
 };
 
 }  // namespace mirevo

@@ -1,9 +1,9 @@
-#include "evaluation/ranks/mpi_evaluator.h"
+#include "evaluation/ranks/rank_evaluator.h"
 
 #include <cmath>
 
 #include "evaluation/evaluation_fixture.h"
-#include "evaluation/fake_channel.h"
+#include "evaluation/fake_job.h"
 #include "evaluation/fake_launcher.h"
 
 namespace mirevo {
@@ -16,33 +16,33 @@ using testing::HasSubstr;
 using testing::StartsWith;
 
 /// A master with workers that answer when the test lets them: each result is the set's value less 1.
-class MpiEvaluatorTest : public EvaluationTest {
+class RankEvaluatorTest : public EvaluationTest {
  protected:
-  MpiEvaluatorTest() : launcher_([](int, const std::string&) { return FakeLauncher::Batch{}; }) {
-    channel_.onSend = [this](const Message& message) {
+  RankEvaluatorTest() : launcher_([](int, const std::string&) { return FakeLauncher::Batch{}; }) {
+    job_.onSend = [this](const Message& message) {
       if (message.tag != static_cast<int>(RankMessage::set)) return;
       running_[message.rank] = decodeSet(message.content).set.at(0);
     };
   }
-  MpiEvaluator& makeMaster(int planned = 100) {
+  RankEvaluator& makeMaster(int planned = 100) {
     makeRunner(launcher_, 0);
     failedRuns_ = std::make_unique<FailedRunPolicy>(planned, foldersToKeep_);
-    master_ = std::make_unique<MpiEvaluator>(*runner_, channel_, observer_, *failedRuns_, earlier_.get());
+    master_ = std::make_unique<RankEvaluator>(*runner_, job_, observer_, *failedRuns_, earlier_.get());
     return *master_;
   }
-  void becomeReady(int rank) { channel_.deliver(rank, RankMessage::ready, encode(ReadyMessage{"node", "/folder"})); }
+  void becomeReady(int rank) { job_.deliver(rank, RankMessage::ready, encode(ReadyMessage{"node", "/folder"})); }
   void answer(int rank) {
     ResultMessage message;
     message.result.measureValues = {running_.at(rank) - 1.0};
     message.result.objectiveValues = {std::abs(running_.at(rank) - 1.0)};
     message.result.aggregate = -99.0;  // the worker's own, which counts for nothing
-    channel_.deliver(rank, RankMessage::result, encode(message));
+    job_.deliver(rank, RankMessage::result, encode(message));
     running_.erase(rank);
   }
   /// The running workers answer one by one, those first whose set has the largest value.
   void answerLargestFirst() {
-    channel_.onReceive = [this](double) {
-      if (!channel_.arriving.empty() || running_.empty()) return;
+    job_.onReceive = [this](double) {
+      if (!job_.arriving.empty() || running_.empty()) return;
       int first = running_.begin()->first;
       for (const auto& [rank, value] : running_) {
         if (value > running_.at(first)) first = rank;
@@ -52,13 +52,13 @@ class MpiEvaluatorTest : public EvaluationTest {
   }
 
   FakeLauncher launcher_;
-  FakeChannel channel_{3};
+  FakeJob job_{3};
   std::map<int, double> running_;  ///< the set's value, by rank
-  std::unique_ptr<MpiEvaluator> master_;
+  std::unique_ptr<RankEvaluator> master_;
 };
 
-TEST_F(MpiEvaluatorTest, WhoeverIsFreeGetsTheNextSetAndResultsStandInTheOrderOfTheSets) {
-  MpiEvaluator& master = makeMaster();
+TEST_F(RankEvaluatorTest, WhoeverIsFreeGetsTheNextSetAndResultsStandInTheOrderOfTheSets) {
+  RankEvaluator& master = makeMaster();
   becomeReady(2);
   becomeReady(1);
   answerLargestFirst();
@@ -75,19 +75,19 @@ TEST_F(MpiEvaluatorTest, WhoeverIsFreeGetsTheNextSetAndResultsStandInTheOrderOfT
                   "Evaluation of parameter set No. 5 initiated", "Evaluation of parameter set No. 5 completed: OK",
                   "record 5 a=6 OK", "Evaluation of parameter set No. 2 completed: OK", "record 2 a=2 OK"));
   std::vector<int> receivers;
-  for (const Message& message : channel_.sent) receivers.push_back(message.rank);
+  for (const Message& message : job_.sent) receivers.push_back(message.rank);
   EXPECT_THAT(receivers, ElementsAre(2, 1, 2, 2));
 
   // The numbers go on, and of two free workers the first is taken.
   const auto next = evaluate(master, {1.0});
   EXPECT_EQ(next.at(0).number, 6);
-  EXPECT_EQ(channel_.sent.back().rank, 1);
+  EXPECT_EQ(job_.sent.back().rank, 1);
   EXPECT_EQ(launcher_.starts, 0);
 }
 
-TEST_F(MpiEvaluatorTest, TheMasterComputesAggregatesAsItAloneKnowsTheTransformation) {
+TEST_F(RankEvaluatorTest, TheMasterComputesAggregatesAsItAloneKnowsTheTransformation) {
   method_ = AggregationMethod::commonProbability;
-  MpiEvaluator& master = makeMaster();
+  RankEvaluator& master = makeMaster();
   becomeReady(1);
   answerLargestFirst();
   auto sample = evaluate(master, {2.0, 3.0, 4.0});
@@ -99,13 +99,13 @@ TEST_F(MpiEvaluatorTest, TheMasterComputesAggregatesAsItAloneKnowsTheTransformat
   EXPECT_NE(later[0].aggregate, -99.0);
 }
 
-TEST_F(MpiEvaluatorTest, FailedRunsOfAllWorkersCountTogether) {
-  MpiEvaluator& master = makeMaster(10);
+TEST_F(RankEvaluatorTest, FailedRunsOfAllWorkersCountTogether) {
+  RankEvaluator& master = makeMaster(10);
   becomeReady(1);
   becomeReady(2);
-  channel_.onSend = [this](const Message& message) {
+  job_.onSend = [this](const Message& message) {
     ResultMessage failed{runner_->failedResult({EvaluationFailure::Kind::exitCode, "code 3", {"last words"}}), "left"};
-    channel_.deliver(message.rank, RankMessage::result, encode(failed));
+    job_.deliver(message.rank, RankMessage::result, encode(failed));
   };
   EXPECT_THAT(refusalOf([&] { evaluate(master, std::vector(4, 2.0)); }),
               AllOf(StartsWith("Error: Unable to continue. No of failed simulations too high.\n"),
@@ -114,19 +114,19 @@ TEST_F(MpiEvaluatorTest, FailedRunsOfAllWorkersCountTogether) {
   EXPECT_THAT(observer_.events, Contains("warning: Evaluation of parameter set No. 1: left"));
 }
 
-TEST_F(MpiEvaluatorTest, AWorkersFatalErrorIsTheMastersWithItsPlace) {
-  MpiEvaluator& master = makeMaster();
+TEST_F(RankEvaluatorTest, AWorkersFatalErrorIsTheMastersWithItsPlace) {
+  RankEvaluator& master = makeMaster();
   becomeReady(1);
   becomeReady(2);
-  channel_.deliver(2, RankMessage::failure, encode(FailureMessage{"Error: Unable to open x", "No space left"}));
+  job_.deliver(2, RankMessage::failure, encode(FailureMessage{"Error: Unable to open x", "No space left"}));
   EXPECT_EQ(refusalOf([&] { evaluate(master, {2.0}); }),
             "Error: Unable to open x\nNo space left\nreported by worker 2 on node");
 }
 
-TEST_F(MpiEvaluatorTest, ACancelledRunStopsWhileWorkersAreBusy) {
-  MpiEvaluator& master = makeMaster();
+TEST_F(RankEvaluatorTest, ACancelledRunStopsWhileWorkersAreBusy) {
+  RankEvaluator& master = makeMaster();
   becomeReady(1);
-  channel_.onReceive = [this](double seconds) {
+  job_.onReceive = [this](double seconds) {
     EXPECT_LE(seconds, 3.0);
     observer_.cancelled = !running_.empty();
   };
@@ -134,37 +134,37 @@ TEST_F(MpiEvaluatorTest, ACancelledRunStopsWhileWorkersAreBusy) {
   EXPECT_EQ(observer_.events.back(), "EM: Simulation cancelled");
 }
 
-TEST_F(MpiEvaluatorTest, StoppingGoesInRankOrderAndEndsWithTheLastFarewell) {
-  channel_.onSend = nullptr;
-  channel_.deliver(2, RankMessage::failure, encode(FailureMessage{"too late", "No space left"}));
-  channel_.deliver(2, RankMessage::farewell, {});
-  channel_.deliver(1, RankMessage::farewell, {});
+TEST_F(RankEvaluatorTest, StoppingGoesInRankOrderAndEndsWithTheLastFarewell) {
+  job_.onSend = nullptr;
+  job_.deliver(2, RankMessage::failure, encode(FailureMessage{"too late", "No space left"}));
+  job_.deliver(2, RankMessage::farewell, {});
+  job_.deliver(1, RankMessage::farewell, {});
   std::vector<std::string> warnings;
   const auto warn = [&](const std::string& text) { warnings.push_back(text); };
-  EXPECT_TRUE(stopWorkers(channel_, 5.0, warn));
+  EXPECT_TRUE(stopWorkers(job_, 5.0, warn));
   EXPECT_THAT(warnings, ElementsAre("Worker 2 met an error that no evaluation depended on: too late\nNo space left"));
-  ASSERT_EQ(channel_.sent.size(), 2U);
-  EXPECT_EQ(channel_.sent[0].rank, 1);
-  EXPECT_EQ(channel_.sent[1].tag, static_cast<int>(RankMessage::stop));
-  channel_.deliver(1, RankMessage::farewell, {});
-  EXPECT_FALSE(stopWorkers(channel_, 5.0, warn));  // the other one says nothing
+  ASSERT_EQ(job_.sent.size(), 2U);
+  EXPECT_EQ(job_.sent[0].rank, 1);
+  EXPECT_EQ(job_.sent[1].tag, static_cast<int>(RankMessage::stop));
+  job_.deliver(1, RankMessage::farewell, {});
+  EXPECT_FALSE(stopWorkers(job_, 5.0, warn));  // the other one says nothing
 }
 
-TEST_F(MpiEvaluatorTest, TheWorkerOfAnEarlyFailureIsToldToKeepItsFolder) {
+TEST_F(RankEvaluatorTest, TheWorkerOfAnEarlyFailureIsToldToKeepItsFolder) {
   foldersToKeep_ = 1;
-  MpiEvaluator& master = makeMaster();
+  RankEvaluator& master = makeMaster();
   becomeReady(1);
-  channel_.onReceive = [this](double) {
+  job_.onReceive = [this](double) {
     if (running_.erase(1) == 0) return;
     ResultMessage message;
     message.result.measureValues = message.result.objectiveValues = {kFailedRunValue};
     message.result.failure = EvaluationFailure{EvaluationFailure::Kind::timedOut, "too long", {}};
-    channel_.deliver(1, RankMessage::result, encode(message));
+    job_.deliver(1, RankMessage::result, encode(message));
   };
   evaluate(master, {2.0, 3.0});
-  ASSERT_EQ(channel_.sent.size(), 3U);  // set, keep, set
-  EXPECT_EQ(channel_.sent[1].tag, static_cast<int>(RankMessage::keepFolder));
-  EXPECT_EQ(decodeKeepFolder(channel_.sent[1].content).number, 1);
+  ASSERT_EQ(job_.sent.size(), 3U);  // set, keep, set
+  EXPECT_EQ(job_.sent[1].tag, static_cast<int>(RankMessage::keepFolder));
+  EXPECT_EQ(decodeKeepFolder(job_.sent[1].content).number, 1);
 }
 
 }  // namespace

@@ -1,8 +1,8 @@
-#include "evaluation/ranks/mpi_worker.h"
+#include "evaluation/ranks/rank_worker.h"
 
 #include <utility>
 
-#include <fmt/format.h>
+#include <fmt/core.h>
 
 #include "common/clock.h"
 #include "common/fatal_error.h"
@@ -12,23 +12,23 @@ namespace {
 
 constexpr int kMaster = 0;
 constexpr int kSlot = 1;
-/// A wait without a model has no reason to end early; the channel's own naps grow no further anyway.
+/// A wait without a model has no reason to end early; the job's own naps grow no further anyway.
 constexpr double kIdleSeconds = 3600.0;
 /// Longest time between two looks for the stop message while the model runs; a model that ends ends the wait.
 constexpr double kBusyPollSeconds = 0.1;
 
-void sendToMaster(MessageChannel& channel, RankMessage tag, std::string content) {
-  channel.send(kMaster, static_cast<int>(tag), std::move(content));
+void sendToMaster(Job& job, RankMessage tag, std::string content) {
+  job.send(kMaster, static_cast<int>(tag), std::move(content));
 }
 
-Message await(MessageChannel& channel) {
+Message await(Job& job) {
   while (true) {
-    if (auto message = channel.receive(kIdleSeconds)) return std::move(*message);
+    if (auto message = job.receive(kIdleSeconds)) return std::move(*message);
   }
 }
 
 [[noreturn]] void refuse(const Message& message) {
-  fatalError("Error: MPI communication failed",
+  fatalError(kCommunicationFailed,
              fmt::format("rank {} sent a message of kind {} out of turn", message.rank, message.tag));
 }
 
@@ -40,12 +40,12 @@ bool isExecuting(ModelRunner& runner) {
 }
 
 /// Runs the model with one set; nothing when the master says stop meanwhile.
-std::optional<ResultMessage> runModel(MessageChannel& channel, ModelRunner& runner, const SetMessage& message) {
+std::optional<ResultMessage> runModel(Job& job, ModelRunner& runner, const SetMessage& message) {
   if (auto failure = runner.prepareModelRun(message.set, kSlot))
     return ResultMessage{runner.failedResult(*failure), {}};
   while (isExecuting(runner)) {
     runner.launcher().waitForChange(kBusyPollSeconds);
-    const auto arrived = channel.receive(0.0);
+    const auto arrived = job.receive(0.0);
     if (!arrived) continue;
     if (arrived->tag != static_cast<int>(RankMessage::stop)) refuse(*arrived);
     runner.launcher().haltProcesses();
@@ -58,42 +58,41 @@ std::optional<ResultMessage> runModel(MessageChannel& channel, ModelRunner& runn
 
 }  // namespace
 
-void runWorkerLoop(MessageChannel& channel, ModelRunner& runner) {
-  sendToMaster(channel, RankMessage::ready,
-               encode(ReadyMessage{hostName(), runner.launcher().getProcessFolder(kSlot)}));
+void runWorkerLoop(Job& job, ModelRunner& runner) {
+  sendToMaster(job, RankMessage::ready, encode(ReadyMessage{hostName(), runner.launcher().getProcessFolder(kSlot)}));
   std::vector<std::string> warnings;  // of what was done since the last result, told with the next one
   while (true) {
-    const Message message = await(channel);
+    const Message message = await(job);
     if (message.tag == static_cast<int>(RankMessage::stop)) return;
     if (message.tag == static_cast<int>(RankMessage::keepFolder)) {
       runner.keepFailedFolder(kSlot, decodeKeepFolder(message.content).number, warnings);
       continue;
     }
     if (message.tag != static_cast<int>(RankMessage::set)) refuse(message);
-    auto result = runModel(channel, runner, decodeSet(message.content));
+    auto result = runModel(job, runner, decodeSet(message.content));
     if (!result) return;
     std::vector<std::string>& told = result->result.warnings;
     told.insert(told.begin(), warnings.begin(), warnings.end());
     warnings.clear();
-    sendToMaster(channel, RankMessage::result, encode(*result));
+    sendToMaster(job, RankMessage::result, encode(*result));
   }
 }
 
-std::optional<BeginMessage> awaitBegin(MessageChannel& channel) {
-  const Message message = await(channel);
+std::optional<BeginMessage> awaitBegin(Job& job) {
+  const Message message = await(job);
   if (message.tag == static_cast<int>(RankMessage::begin)) return decodeBegin(message.content);
   if (message.tag != static_cast<int>(RankMessage::stop)) refuse(message);
   return std::nullopt;
 }
 
-void sayFarewell(MessageChannel& channel) {
-  sendToMaster(channel, RankMessage::farewell, {});
+void sayFarewell(Job& job) {
+  sendToMaster(job, RankMessage::farewell, {});
 }
 
-void reportFailure(MessageChannel& channel, const FailureMessage& failure) {
-  sendToMaster(channel, RankMessage::failure, encode(failure));
+void reportFailure(Job& job, const FailureMessage& failure) {
+  sendToMaster(job, RankMessage::failure, encode(failure));
   while (true) {
-    const Message message = await(channel);
+    const Message message = await(job);
     if (message.tag == static_cast<int>(RankMessage::stop)) return;
   }
 }

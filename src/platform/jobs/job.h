@@ -1,0 +1,60 @@
+#pragma once
+
+#include <memory>
+#include <optional>
+#include <string>
+#include <string_view>
+
+namespace mirevo {
+
+/// A message between two processes of one job.
+struct Message {
+  int rank = 0;         ///< the sender's
+  int tag = 0;          ///< what it is; its meaning is the users' of the job
+  std::string content;  ///< bytes
+};
+
+/// The message of a fatal error of a job's communication, whose detail says more.
+constexpr const char* kCommunicationFailed = "Error: MPI communication failed";
+
+/// The job that this process is part of: the processes that a job launcher started together for one run, and messages
+/// among them. A plain run is a job of one process.
+class Job {
+ public:
+  Job() = default;
+  Job(const Job&) = delete;
+  Job& operator=(const Job&) = delete;
+  virtual ~Job() = default;
+
+  /// By what its processes reach each other, as the user knows it; empty in a job of one process.
+  virtual std::string_view means() const = 0;
+
+  /// This process's number: 0 the master, above 0 a worker; -1 in a job of one process.
+  virtual int rank() const = 0;
+
+  /// Number of processes in the job; their ranks count from 0.
+  virtual int processCount() const = 0;
+  bool hasWorkers() const { return processCount() > 1; }
+
+  /// Sends without ever waiting for the receiver. Messages of one sender arrive in the order of sending. Throws
+  /// FatalError when the job's communication is broken.
+  virtual void send(int rank, int tag, std::string content) = 0;
+
+  /// The next message from anyone; nothing when none has come within `seconds` (0: does not wait). Sleeps while it
+  /// waits. Throws FatalError when the job's communication is broken.
+  virtual std::optional<Message> receive(double seconds) = 0;
+
+  /// Leaves the job, after which this process is one of its own; every process of the job must do so. Throws FatalError
+  /// when what was sent last is not taken within `seconds`.
+  virtual void finalise(double seconds) = 0;
+
+  /// Ends every process of the job at once: the way out when one of them does not answer. Does not return.
+  virtual void abort(int exitCode) = 0;
+};
+
+/// Joins the job that a launcher has started; where there is none, this process is a job of its own. Throws FatalError
+/// when a launcher started several processes that cannot be brought together: they would all do the same run. Call it
+/// before signal handlers are installed, as what brings them together may install some of its own.
+std::unique_ptr<Job> joinJob();
+
+}  // namespace mirevo

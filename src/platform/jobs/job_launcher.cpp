@@ -1,0 +1,54 @@
+#include "platform/jobs/job_launcher.h"
+
+#include <algorithm>
+#include <array>
+#include <cstdlib>
+#include <string>
+#include <string_view>
+#include <unistd.h>
+#include <vector>
+
+#include "common/text.h"
+
+namespace mirevo {
+namespace {
+
+/// By which launchers tell a process its number and the number of processes: OpenMPI's mpirun; the process management
+/// interface of other launchers and of Slurm in its old form and in its new one, which has no variable for the size.
+constexpr std::array<const char*, 3> kRankVariables = {"OMPI_COMM_WORLD_RANK", "PMIX_RANK", "PMI_RANK"};
+constexpr std::array<const char*, 2> kSizeVariables = {"OMPI_COMM_WORLD_SIZE", "PMI_SIZE"};
+/// Whatever a launcher or MPI itself puts into the environment of a process of the job.
+constexpr std::array<std::string_view, 6> kJobPrefixes = {"OMPI_", "PMIX_", "PMI_", "ORTE_", "OPAL_", "PRTE_"};
+
+template <class Names>
+std::optional<int> firstNumber(const Names& names) {
+  for (const char* name : names) {
+    const char* value = std::getenv(name);
+    if (value == nullptr) continue;
+    if (const auto number = parseInteger(value)) return *number;
+  }
+  return std::nullopt;
+}
+
+}  // namespace
+
+int launcherRank() {
+  return firstNumber(kRankVariables).value_or(-1);
+}
+
+std::optional<int> launchedProcessCount() {
+  return firstNumber(kSizeVariables);
+}
+
+void hideJobFromModels() {
+  std::vector<std::string> names;
+  for (char** variable = ::environ; *variable != nullptr; ++variable) {
+    const std::string_view text = *variable;
+    const bool isJobs = std::any_of(kJobPrefixes.begin(), kJobPrefixes.end(),
+                                    [text](std::string_view prefix) { return text.starts_with(prefix); });
+    if (isJobs) names.emplace_back(text.substr(0, text.find('=')));
+  }
+  for (const std::string& name : names) ::unsetenv(name.c_str());
+}
+
+}  // namespace mirevo

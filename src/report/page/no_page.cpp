@@ -1,0 +1,9 @@
+#include "report/page/page_template.h"
+
+namespace mirevo {
+
+std::string_view reportPageTemplate() {
+  return {};
+}
+
+}  // namespace mirevo

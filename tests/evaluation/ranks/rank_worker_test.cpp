@@ -1,0 +1,139 @@
+#include "evaluation/ranks/rank_worker.h"
+
+#include "evaluation/evaluation_fixture.h"
+#include "evaluation/fake_job.h"
+#include "evaluation/fake_launcher.h"
+
+namespace mirevo {
+namespace {
+
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::IsEmpty;
+
+/// A worker whose master sends the next of `sets` for each answer, and then stop.
+class RankWorkerTest : public EvaluationTest {
+ protected:
+  RankWorkerTest() : launcher_(batch) {
+    job_.onSend = [this](const Message&) {
+      if (sets_.empty()) {
+        job_.deliver(0, RankMessage::stop, {});
+      } else {
+        job_.deliver(0, RankMessage::set, encode(SetMessage{1, {sets_.front()}}));
+        sets_.pop_front();
+      }
+    };
+    makeRunner(launcher_, 1);
+  }
+  /// The model with a = 2. The second run leaves a process behind, the third one does not end.
+  static FakeLauncher::Batch batch(int start, const std::string&) {
+    FakeLauncher::Batch batch;
+    batch.seconds = start < 3 ? 10.0 : 1e9;
+    batch.leftBehind = start == 2 ? "a process" : "";
+    batch.write = [](const std::string& folder) { std::ofstream(folder + "/simulated.csv") << series(2.0); };
+    return batch;
+  }
+  std::vector<RankMessage> sentTags() const {
+    std::vector<RankMessage> tags;
+    for (const Message& message : job_.sent) tags.push_back(static_cast<RankMessage>(message.tag));
+    return tags;
+  }
+
+  /// Of the answer to the set with that number, from 1.
+  std::vector<std::string> warningsOf(std::size_t set) const {
+    return decodeResult(job_.sent.at(set).content).result.warnings;
+  }
+
+  FakeLauncher launcher_;
+  FakeJob job_{3};
+  std::deque<double> sets_;
+};
+
+TEST_F(RankWorkerTest, AnswersEachSetUntilItIsToldToStop) {
+  sets_ = {2.0, 9.5, 2.0};
+  runWorkerLoop(job_, *runner_);
+  ASSERT_THAT(sentTags(),
+              ElementsAre(RankMessage::ready, RankMessage::result, RankMessage::result, RankMessage::result));
+  EXPECT_EQ(decodeReady(job_.sent[0].content).processFolder, folder_ / "run_Process1");
+  const ResultMessage first = decodeResult(job_.sent[1].content);
+  EXPECT_THAT(first.result.measureValues, ElementsAre(1.0));
+  EXPECT_EQ(first.leftBehind, "");
+  EXPECT_EQ(decodeResult(job_.sent[2].content).result.failure->kind, EvaluationFailure::Kind::constraintsViolated);
+  EXPECT_EQ(decodeResult(job_.sent[3].content).leftBehind, "a process");
+  EXPECT_EQ(launcher_.starts, 2);
+}
+
+TEST_F(RankWorkerTest, KeepsTheFolderOfItsLastRunWhereTheMasterSaysSo) {
+  description_.failedFolderPrefix = folder_ / "run_Failed";
+  makeRunner(launcher_, 1);
+  sets_ = {2.0, 3.0};
+  const auto sendNext = job_.onSend;
+  job_.onSend = [this, sendNext](const Message& message) {
+    if (message.tag == static_cast<int>(RankMessage::result) && sets_.size() == 1) {
+      job_.deliver(0, RankMessage::keepFolder, encode(KeepFolderMessage{17}));
+    }
+    sendNext(message);
+  };
+  runWorkerLoop(job_, *runner_);
+  EXPECT_THAT(folder_.read("run_Failed17/parameters.txt"), testing::EndsWith(" 2\n"));
+  EXPECT_THAT(sentTags(), ElementsAre(RankMessage::ready, RankMessage::result, RankMessage::result));
+}
+
+TEST_F(RankWorkerTest, AWarningIsToldOnceWithTheNextResultThere) {
+  description_.savedFiles = {folder_ / "base/often.txt"};
+  description_.savedFolder = folder_ / "run_Saved";
+  description_.failedFolderPrefix = folder_ / "none/run_Failed";
+  folder_.write("base/often.txt", "");
+  FakeLauncher launcher([](int start, const std::string&) {
+    FakeLauncher::Batch batch;
+    batch.write = [start](const std::string& folder) {
+      std::ofstream(folder + "/simulated.csv") << series(2.0);
+      if (start > 1) std::ofstream(folder + "/often.txt") << "written";
+    };
+    return batch;
+  });
+  makeRunner(launcher, 1);
+  sets_ = {2.0, 2.0, 2.0, 2.0};
+  const auto sendNext = job_.onSend;
+  job_.onSend = [this, sendNext](const Message& message) {
+    if (sets_.size() == 2) job_.deliver(0, RankMessage::keepFolder, encode(KeepFolderMessage{17}));
+    sendNext(message);
+  };
+  runWorkerLoop(job_, *runner_);
+  ASSERT_EQ(job_.sent.size(), 5U);
+  EXPECT_THAT(warningsOf(1), ElementsAre(HasSubstr("often.txt was not kept: the model run did not write it")));
+  EXPECT_THAT(warningsOf(2), IsEmpty());
+  EXPECT_THAT(warningsOf(3), ElementsAre(HasSubstr("The folder of this run was not kept as")));
+  EXPECT_THAT(warningsOf(4), IsEmpty());
+}
+
+TEST_F(RankWorkerTest, StopEndsAModelThatRuns) {
+  sets_ = {2.0, 2.0, 2.0};
+  job_.onReceive = [this](double) {
+    if (launcher_.starts == 3 && launcher_.now > 25.0) job_.deliver(0, RankMessage::stop, {});
+  };
+  runWorkerLoop(job_, *runner_);
+  EXPECT_EQ(launcher_.halts, 1);
+  EXPECT_EQ(launcher_.runningCount(), 0);
+  EXPECT_LE(launcher_.now, 25.5);  // it listens often
+  EXPECT_EQ(job_.sent.size(), 3U);
+}
+
+TEST(RankMessages, ContentThatWasCutOrHasMoreIsRefused) {
+  ResultMessage message;
+  message.result.measureValues = {1.0, -0.0};
+  message.result.failure = EvaluationFailure{EvaluationFailure::Kind::signal, "why", {"a", ""}};
+  message.result.warnings = {"careful"};
+  message.result.shownSeries = {{{10, 20}, {1.0F, 2.0F}}, {}};
+  message.leftBehind = "left";
+  const std::string content = encode(message);
+  EXPECT_EQ(encode(decodeResult(content)), content);
+  for (std::size_t length = 0; length < content.size(); ++length) {
+    EXPECT_THROW(decodeResult(content.substr(0, length)), FatalError) << length;
+  }
+  EXPECT_THROW(decodeResult(content + "x"), FatalError);
+  EXPECT_THROW(decodeSet(std::string(12, '\xff')), FatalError);  // a count that no memory could hold
+}
+
+}  // namespace
+}  // namespace mirevo
