@@ -28,7 +28,7 @@ struct ReportedRun {
   std::string message;  ///< why it stopped; may be empty
   int planned = 0;      ///< evaluations; 0: unknown
   std::string aggregation;
-  std::string algorithm;   ///< "SCE", "PSE" or "DDS"; empty where there is none
+  std::string algorithm;   ///< the name of a search: "DDS"; empty where there is none
   std::string surrogate;   ///< empty: none
   int populationSize = 0;  ///< 0: none
   std::string periodStart;

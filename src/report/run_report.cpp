@@ -156,7 +156,8 @@ void ReportBuilder::findBestAndInitial() {
   if (initial.number()) initial_ = rowOf(*initial.number());
   // The search knows which of equally good ones it took.
   if (const auto& recorded = sources_.record.best) {
-    if (const ResultRow* row = rowOf(recorded->number)) best_ = row;
+    const ResultRow* row = rowOf(recorded->number);
+    if (row != nullptr && best_ != nullptr && row->ok && row->aggregate == best_->aggregate) best_ = row;
   }
   if (best_ != nullptr) data_.best = ShownEvaluation{best_->number, best_->aggregate};
   data_.initialNumber = initial.number();

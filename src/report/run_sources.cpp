@@ -51,6 +51,8 @@ std::optional<RunSources> readRunSources(const RunConfig& config, const SearchSp
   std::stable_sort(sources.results.rows.begin(), sources.results.rows.end(),
                    [](const ResultRow& a, const ResultRow& b) { return a.number < b.number; });
   auto record = readRunRecord(readFileIfThere(runFilePath(filePrefix, run_files::kRecord)).value_or(""));
+  // One record per setup: that of a run of another task says nothing about these results.
+  if (record && record->task != config.task->facts().name.name) record.reset();
   const bool isGoingOn = RunLock::isHeld(config.setupFile);
   if (!record) {
     record = recordOfEarlierVersion(sources.results);

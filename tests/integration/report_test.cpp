@@ -159,6 +159,23 @@ TEST(Report, OfResultsOfAnEarlierVersion) {
   }
 }
 
+/// The record of a run is one per setup, result files are one per task.
+TEST(Report, OfATaskThatWasNotTheLastOneOfItsSetup) {
+  const ModelFolder folder;
+  folder.writeSetup({.maxEvaluations = 30});
+  ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0);
+  const std::string data = reportData(folder);
+  folder.writeSetup({.option = 1});
+  ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0);
+  folder.writeSetup({.maxEvaluations = 30});
+  EXPECT_EQ(makeReport(folder).exitCode, 0);
+  const std::string again = reportData(folder);
+  for (const char* name : {"\"started\":", "\"state\":", "\"message\":", "\"best\":"}) {
+    const auto member = [name](const std::string& text) { return text.substr(text.find(name), 60); };
+    EXPECT_EQ(member(again), member(data));
+  }
+}
+
 TEST(Report, IsLeftOutWhereTheSetupSaysSoAndNeverFailsTheRun) {
   const ModelFolder folder;
   folder.writeSetup({.option = 0});

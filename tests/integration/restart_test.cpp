@@ -111,6 +111,20 @@ TEST_F(Restart, ARaisedBudgetTakesAFinishedSearchFurther) {
   }
 }
 
+TEST_F(Restart, GoesOnThoughAnotherTaskWasRunInBetween) {
+  writeSetup({});
+  run();
+  const std::string expected = results();
+  writeSetup({.option = 1});
+  run();
+  const std::string analysis = folder_.read("basin_Run.dat");
+  writeSetup({});
+  folder_.write(resultFile_, expected.substr(0, expected.find("\n12\t") + 5));
+  run();
+  EXPECT_EQ(results(), expected);
+  EXPECT_EQ(folder_.read("basin_Run.2.dat"), analysis);
+}
+
 TEST_F(Restart, ARaisedBudgetIsANewSearchOfDds) {
   writeSetup({.includesInitial = false, .maxEvaluations = 20});
   run();

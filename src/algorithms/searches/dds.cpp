@@ -196,8 +196,7 @@ RaisedBudget DdsMethod::raiseBudget(const SearchHistory& history, const Stopping
   raised.earlier = EarlierSearch{history.budget, last};
   raised.note = fmt::format(
       "Max_No_Evaluations was raised from {} to {}: as the probabilities of Dynamically Dimensioned Search depend on "
-      "it, "
-      "a new search starts from the best of the first {} evaluations, which are kept",
+      "it, a new search starts from the best of the first {} evaluations, which are kept",
       history.budget, stopping.maxEvaluations, last);
   return raised;
 }

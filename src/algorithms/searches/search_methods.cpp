@@ -21,6 +21,7 @@ constexpr std::array kSearches = {makeOne<SceMethod>, makeOne<PseMethod>, makeOn
 
 std::vector<std::unique_ptr<SearchMethod>> searchMethods() {
   std::vector<std::unique_ptr<SearchMethod>> methods;
+  methods.reserve(kSearches.size());
   for (const auto& make : kSearches) methods.push_back(make());
   return methods;
 }

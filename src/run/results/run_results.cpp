@@ -55,7 +55,10 @@ RunResults::RunResults(const RunConfig& config, const SearchSpace& space, const 
   if (!config.task) return;
   files_ = restartFiles(filePrefix, config.task->facts().resultFiles);
   if (config.restart != RestartMode::startAfresh) {
-    earlierRun_ = findEarlierRun(*files_, config, columns_, record_.readEarlier());
+    std::optional<RunRecord> record = record_.readEarlier();
+    followsOtherTask_ = record && record->task != config.task->facts().name.name;
+    if (followsOtherTask_) record.reset();
+    earlierRun_ = findEarlierRun(*files_, config, columns_, std::move(record));
   }
 }
 
@@ -134,6 +137,11 @@ void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggreg
   for (const ResultRow& row : run.rows) {
     (row.ok ? succeeded : failedNumbers).insert(row.number);
     if (!row.ok) failed[row.number] = row.parameters;
+  }
+  if (followsOtherTask_) {
+    for (const std::string& path : {record_.path(), failedRuns_.paths().table, failedRuns_.paths().forPeople}) {
+      keepEarlierFile(path);
+    }
   }
   const std::map<int, EvaluationFailure> failures = failedRuns_.takeUp(failed);
   const std::string failedFolders = runFilePath(processFolderPrefix(config), run_files::kFailedFolder);

@@ -64,6 +64,7 @@ class RunResults final {
   ResultColumns columns_;
   std::optional<RestartFiles> files_;  ///< nothing for a task without results
   std::optional<EarlierRun> earlierRun_;
+  bool followsOtherTask_ = false;  ///< the files that are one per setup were left by a run of another task
   ResultFile table_;
   FailedRunFile failedRuns_;
   RunRecordFile record_;

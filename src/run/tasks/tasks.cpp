@@ -23,6 +23,7 @@ constexpr std::array kTasks = {makeOne<ScenarioTask>, makeOne<SensitivityTask>, 
 
 std::vector<std::unique_ptr<Task>> allTasks() {
   std::vector<std::unique_ptr<Task>> tasks;
+  tasks.reserve(kTasks.size());
   for (const auto& make : kTasks) tasks.push_back(make());
   return tasks;
 }
