@@ -8,7 +8,7 @@
 namespace mirevo {
 
 /// Waits for something that another process does; false when it has not come in time.
-inline bool waitUntil(const std::function<bool()>& condition, double seconds = 100.0) {
+inline bool waitUntil(const std::function<bool()>& condition, double seconds = 250.0) {
   for (int i = 0; i < static_cast<int>(seconds * 100.0); ++i) {
     if (condition()) return true;
     const timespec pause{0, 10'000'000};

@@ -6,6 +6,7 @@
 #include <poll.h>
 #include <signal.h>
 #include <string>
+#include <sys/prctl.h>
 #include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -34,6 +35,8 @@ class RunningProgram {
                           const char* program = MIREVO_PROGRAM) {
     process_ = ::fork();
     if (process_ != 0) return;
+    ::setpgid(0, 0);  // what mpirun signals to its group is not for the test
+    ::prctl(PR_SET_PDEATHSIG, SIGKILL);
     ::dup2(::open((outputs_ / "out").c_str(), O_WRONLY | O_CREAT, 0666), STDOUT_FILENO);
     ::dup2(::open((outputs_ / "err").c_str(), O_WRONLY | O_CREAT, 0666), STDERR_FILENO);
     become(program, arguments, environment);
@@ -58,7 +61,7 @@ class RunningProgram {
 
   void send(int signal) const { ::kill(process_, signal); }
 
-  ProgramResult wait(double seconds = 100.0) {
+  ProgramResult wait(double seconds = 250.0) {
     ProgramResult result;
     const int watched = static_cast<int>(::syscall(SYS_pidfd_open, process_, 0));
     pollfd ended{watched, POLLIN, 0};
