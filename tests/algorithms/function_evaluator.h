@@ -38,11 +38,7 @@ class FunctionEvaluator final : public Evaluator {
 
 /// A result that holds one value as measure, objective function and aggregate.
 inline EvaluationResult resultOf(double value) {
-  EvaluationResult result;
-  result.measureValues = {value};
-  result.objectiveValues = {value};
-  result.aggregate = value;
-  return result;
+  return {.measureValues = {value}, .objectiveValues = {value}, .aggregate = value};
 }
 
 /// The result of a run that failed.

@@ -32,13 +32,12 @@ TEST(DataTable, TextsComeBackAsTheyWereWhateverTheyHold) {
 }
 
 TEST(DataTable, NumbersComeBackAsTheSameBitsAndWholeRowsOnly) {
-  const double values[] = {0.1 + 0.2, -0.0, 5e-324, std::numeric_limits<double>::max(), 1e30, INFINITY, -INFINITY};
+  const std::vector<double> values{0.1 + 0.2, -0.0, 5e-324, std::numeric_limits<double>::max(), INFINITY, -INFINITY};
   DataTable table{{}, {}, {"Number", "Value"}, {}};
-  for (std::size_t i = 0; i < std::size(values); ++i) table.rows.push_back({std::int64_t{-7}, values[i]});
-  std::string text = dataTableText(table);
-  const ReadTable read = readDataTable(text + "1\n1\t2\t3\n8\t9");
-  ASSERT_EQ(read.rows.size(), std::size(values));
-  for (std::size_t i = 0; i < std::size(values); ++i) {
+  for (const double value : values) table.rows.push_back({std::int64_t{-7}, value});
+  const ReadTable read = readDataTable(dataTableText(table) + "1\n1\t2\t3\n8\t9");
+  ASSERT_EQ(read.rows.size(), values.size());
+  for (std::size_t i = 0; i < values.size(); ++i) {
     EXPECT_EQ(read.rows[i][0], "-7");
     EXPECT_EQ(std::bit_cast<std::uint64_t>(*realCell(read.rows[i][1])), std::bit_cast<std::uint64_t>(values[i]));
   }

@@ -50,30 +50,18 @@ class EvaluationTest : public testing::Test {
     description_.fileTag = "_tag";
     description_.parameterFiles = {
         {TemplateType::delimiter, folder_ / "base/parameters.txt", folder_ / "base/parameters.tpl"}};
-    OutputMeasure measure;
-    measure.name = "bias";
-    measure.simulation = {folder_ / "base/simulated.csv", 1};
-    measure.observation = {folder_ / "observed.csv", 1};
-    description_.measures = {measure};
+    description_.measures = {{.name = "bias",
+                              .simulation = {folder_ / "base/simulated.csv", 1},
+                              .observation = {folder_ / "observed.csv", 1}}};
     description_.period = {{2001, 1, 1}, {2001, 12, 31}};
-    ObjectiveFunction objective;
-    objective.name = "all";
-    objective.functionType = FunctionType::sumOfAbsolutes;
-    objective.measures = {0};
-    description_.objectives = {objective};
+    description_.objectives = {{.name = "all", .functionType = FunctionType::sumOfAbsolutes, .measures = {0}}};
     settings_.baseFolder = description_.baseFolder;
     settings_.processFolderPrefix = folder_ / "run_Process";
     settings_.batchItems = {{folder_ / "base/run.sh", ""}};
 
-    ModelParameter a;
-    a.name = "a";
-    a.initialValue = 2.0;
-    a.upperBound = 10.0;
-    a.idValue = 1.5e-35;
-    ModelParameter dependent;
-    dependent.name = "inverse";
-    dependent.parameterType = ParameterType::dependent;
-    dependent.equation = "1 / (a - 5)";
+    const ModelParameter a{.initialValue = 2.0, .upperBound = 10.0, .idValue = 1.5e-35, .name = "a"};
+    const ModelParameter dependent{
+        .parameterType = ParameterType::dependent, .name = "inverse", .equation = "1 / (a - 5)"};
     parameters_ = std::make_unique<ParameterModel>(std::vector{a, dependent},
                                                    std::vector<InternalConstraint>{{"a", "9", LogicalOperator::less}});
   }
@@ -91,9 +79,9 @@ class EvaluationTest : public testing::Test {
     std::map<int, EarlierEvaluations::Record> records;
     for (const auto& [number, value] : values) {
       EarlierEvaluations::Record& record = records[number];
+      const double measure = std::abs(value) - 1.0;
       record.parameterValues = {std::abs(value)};
-      record.result.measureValues = {std::abs(value) - 1.0};
-      record.result.objectiveValues = {std::abs(std::abs(value) - 1.0)};
+      record.result = {.measureValues = {measure}, .objectiveValues = {std::abs(measure)}};
       if (value < 0) record.result.failure = EvaluationFailure{EvaluationFailure::Kind::signal, "in the past", {}};
     }
     earlier_ = std::make_unique<EarlierEvaluations>(parameters_->searchSpace(), *aggregator_, std::move(records));

@@ -12,25 +12,21 @@ namespace {
 class LocalEvaluatorTest : public EvaluationTest {
  protected:
   /// A batch of that length that computes the series from the parameter file, as the model does.
-  FakeLauncher::Batch computes(double seconds) const {
-    FakeLauncher::Batch batch;
-    batch.seconds = seconds;
-    batch.write = [](const std::string& folder) {
+  static FakeLauncher::Batch computes(double seconds) {
+    const auto compute = [](const std::string& folder) {
       std::ifstream input(folder + "/parameters.txt");
       std::string name, equals;
       double a = 0.0;
       input >> name >> equals >> a;
       std::ofstream(folder + "/simulated.csv") << series(a);
     };
-    return batch;
+    return {.seconds = seconds, .write = compute};
   }
   static FakeLauncher::Batch fails(double seconds) {
-    FakeLauncher::Batch batch;
-    batch.seconds = seconds;
-    batch.failure = {BatchFailure::Kind::exitCode, 3, "run.sh exited with code 3"};
-    batch.output = {"reading", "no convergence"};
-    batch.leftBehind = "run.sh left a process running";
-    return batch;
+    return {.seconds = seconds,
+            .failure = {BatchFailure::Kind::exitCode, 3, "run.sh exited with code 3"},
+            .output = {"reading", "no convergence"},
+            .leftBehind = "run.sh left a process running"};
   }
 };
 

@@ -22,11 +22,7 @@ constexpr float kGap = -99.0F;
 const EvaluationPeriod kJanuary{{2001, 1, 1}, {2001, 1, 31}};
 
 OutputMeasure measure(StatisticType statistic = StatisticType::mean) {
-  OutputMeasure m;
-  m.statisticType = statistic;
-  m.simulation = {"/base/sim.csv  ", 1};
-  m.observation = {"/base/obs.csv", 1};
-  return m;
+  return {.statisticType = statistic, .simulation = {"/base/sim.csv  ", 1}, .observation = {"/base/obs.csv", 1}};
 }
 
 /// A daily series from 2001-01-01 on.

@@ -13,11 +13,7 @@ namespace mirevo {
 namespace {
 
 ObjectiveFunction function(std::string name, FunctionType type, std::vector<std::size_t> measures) {
-  ObjectiveFunction f;
-  f.name = std::move(name);
-  f.functionType = type;
-  f.measures = std::move(measures);
-  return f;
+  return {.name = std::move(name), .functionType = type, .measures = std::move(measures)};
 }
 
 TEST(ObjectiveFunctions, CombineTheirMeasuresByType) {

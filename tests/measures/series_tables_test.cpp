@@ -23,10 +23,7 @@ class SeriesTablesTest : public ::testing::Test {
   }
 
   OutputMeasure measure(const std::string& simulation, const std::string& observation, int simulationItem = 1) const {
-    OutputMeasure m;
-    m.simulation = {folder_ / simulation, simulationItem};
-    m.observation = {folder_ / observation, 1};
-    return m;
+    return {.simulation = {folder_ / simulation, simulationItem}, .observation = {folder_ / observation, 1}};
   }
 
   TemporaryFolder folder_;
@@ -34,9 +31,7 @@ class SeriesTablesTest : public ::testing::Test {
 
 TEST_F(SeriesTablesTest, MeasuresShareTheFilesTheyNameAlike) {
   folder_.write("sim2.csv", "time,Q\n2001-01-01,9\n");
-  OutputMeasure fromFile;
-  fromFile.interfaceType = InterfaceType::measureFile;
-  fromFile.simulation.fileName = (folder_ / "not there");
+  const OutputMeasure fromFile{.interfaceType = InterfaceType::measureFile, .simulation = {folder_ / "not there", 1}};
   const std::vector<OutputMeasure> measures{measure("sim2.csv", "obs.csv"), fromFile, measure("sim.csv", "obs.csv  "),
                                             measure("sim2.csv  ", "obs.csv")};
   SeriesTables tables = SeriesTables::MirevoTSobjectInit(measures, kPeriod);

@@ -15,14 +15,7 @@ namespace {
 ModelParameter parameter(std::string name, double initial, double lower, double upper,
                          TransformationType transformation = TransformationType::none,
                          ParameterType type = ParameterType::variable) {
-  ModelParameter result;
-  result.name = std::move(name);
-  result.initialValue = initial;
-  result.lowerBound = lower;
-  result.upperBound = upper;
-  result.transformationType = transformation;
-  result.parameterType = type;
-  return result;
+  return {initial, lower, upper, transformation, type, 0.0, std::move(name)};
 }
 
 TEST(TransformParameterValue, FollowsItsTable) {

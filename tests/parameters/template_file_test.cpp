@@ -16,13 +16,8 @@ namespace {
 
 std::vector<ModelParameter> parameters() {
   const auto make = [](std::string name, double id, double initial, double lower, double upper) {
-    ModelParameter parameter;
-    parameter.name = std::move(name);
-    parameter.idValue = id;
-    parameter.initialValue = initial;
-    parameter.lowerBound = lower;
-    parameter.upperBound = upper;
-    return parameter;
+    return ModelParameter{
+        .initialValue = initial, .lowerBound = lower, .upperBound = upper, .idValue = id, .name = std::move(name)};
   };
   return {make("K", 1.0e-35, 0.5, 0.01, 100),  make("Manning channel", 1.5e-35, 0.03, 0.01, 0.2),
           make("a 1.1e-35", 1.1e-35, 1, 0, 2), make("K2  ", 1.2e-35, 50, 10, 99),
@@ -146,23 +141,18 @@ TEST(ParameterTemplate, WarnsOfNarrowPlaceholders) {
   EXPECT_THAT(warnings("-!K        !0"), ElementsAre(HasSubstr("touched by \"-\"")));
   EXPECT_THAT(warnings("!K        !0"), ElementsAre(HasSubstr("touched by \"0\"")));
 
-  const auto with = [](ParameterType type, double lower, double upper, TransformationType transformation) {
+  using enum ParameterType;
+  const auto with = [](ParameterType type, double lower, double upper,
+                       TransformationType transformation = TransformationType::none) {
     std::vector<ModelParameter> list = parameters();
-    list[0].parameterType = type;
-    list[0].initialValue = list[0].lowerBound = lower;
-    list[0].upperBound = upper;
-    list[0].transformationType = transformation;
+    list[0] = {lower, lower, upper, transformation, type, 1e-35, "K"};
     return list;
   };
-  constexpr auto kNone = TransformationType::none;
-  EXPECT_THAT(warnings("!K  !", with(ParameterType::variable, 1, 500, TransformationType::integer)), ElementsAre());
-  EXPECT_THAT(warnings("!K!", with(ParameterType::fixed, 7, 0, kNone)), ElementsAre());
-  EXPECT_THAT(warnings("!K  !", with(ParameterType::dependent, 7, 7, kNone)),
-              ElementsAre(HasSubstr("make it 10 wide")));
-  EXPECT_THAT(warnings("!K           !", with(ParameterType::variable, 1e-120, 1, kNone)),
-              ElementsAre(HasSubstr("no width is enough")));
-  EXPECT_THAT(warnings("!K   !", with(ParameterType::variable, -100, 100, kNone)),
-              ElementsAre(HasSubstr("make it 10 wide")));
+  EXPECT_THAT(warnings("!K  !", with(variable, 1, 500, TransformationType::integer)), ElementsAre());
+  EXPECT_THAT(warnings("!K!", with(fixed, 7, 0)), ElementsAre());
+  EXPECT_THAT(warnings("!K  !", with(dependent, 7, 7)), ElementsAre(HasSubstr("make it 10 wide")));
+  EXPECT_THAT(warnings("!K           !", with(variable, 1e-120, 1)), ElementsAre(HasSubstr("no width is enough")));
+  EXPECT_THAT(warnings("!K   !", with(variable, -100, 100)), ElementsAre(HasSubstr("make it 10 wide")));
 }
 
 TEST(WriteParameterFile, RewritesAnExistingFileAndKeepsItsMode) {

@@ -16,10 +16,6 @@ namespace {
 class RunReporterTest : public ::testing::Test {
  protected:
   RunReporterTest() {
-    space_.names = {"k"};
-    space_.initial = space_.lower = {0.0};
-    space_.upper = {10.0};
-    space_.transformation = {TransformationType::logarithmic};
     std::string reason;
     state_.log.open((folder_ / "s.log"), reason);
     state_.progress.progressInit((folder_ / "s.log"), "");
@@ -28,20 +24,20 @@ class RunReporterTest : public ::testing::Test {
   }
 
   void finish(int number, double objective, double set = 0.0) {
-    EvaluationResult result;
-    result.number = number;
-    result.objectiveValues = {objective};
-    result.aggregate = objective;
+    EvaluationResult result{.number = number, .objectiveValues = {objective}, .aggregate = objective};
     if (objective == kFailedRunValue) {
       result.failure = EvaluationFailure{EvaluationFailure::Kind::exitCode, "run.sh exited with code 3", {}};
     }
+    report(result, set);
+  }
+  void report(const EvaluationResult& result, double set = 0.0) {
     reporter_.recordEvaluation(std::span(&set, 1), result);
     reporter_.evaluationFinished(std::span(&set, 1), result);
   }
 
   TemporaryFolder folder_;
   RunState state_;
-  SearchSpace space_;
+  SearchSpace space_{{"k"}, {0.0}, {0.0}, {10.0}, {TransformationType::logarithmic}};
   ResultFile results_;
   FailedRunFile failedRuns_{{folder_ / "calSimErr.dat", folder_ / "s_Failures.dat"}, "s", {"k"}, {"Title"}};
   RunReporter reporter_{state_, results_, failedRuns_, space_};
@@ -61,10 +57,7 @@ TEST_F(RunReporterTest, TheBestIsTheFirstOfEqualsAndNeverAFailure) {
 TEST_F(RunReporterTest, TheBestOfASearchIsTheOneThatItTook) {
   finish(1, 5.0);
   finish(2, 5.0, std::log(2.0));
-  SearchSummary search;
-  search.best = {std::log(2.0)};
-  search.bestResult.number = 2;
-  search.bestResult.aggregate = 5.0;
+  SearchSummary search{.best = {std::log(2.0)}, .bestResult = {.number = 2, .aggregate = 5.0}};
   search.bestResult.failure = EvaluationFailure{};
   reporter_.takeBestOf(search);
   EXPECT_EQ(reporter_.best()->number, 1) << "a search that found nothing";
@@ -76,18 +69,13 @@ TEST_F(RunReporterTest, TheBestOfASearchIsTheOneThatItTook) {
 }
 
 TEST_F(RunReporterTest, AggregatesUnknownOnArrivalAreFilledInWhenTheTransformationIsSettled) {
-  ObjectiveFunction fit;
-  fit.name = "fit";
+  const ObjectiveFunction fit{.name = "fit"};
   ObjectiveAggregator aggregator(std::span(&fit, 1), AggregationMethod::commonDistance);
   ASSERT_FALSE(aggregator.isSettled());
   const auto arrive = [&](int number, double objective) {
-    EvaluationResult result;
-    result.number = number;
-    result.objectiveValues = {objective};
+    EvaluationResult result{.number = number, .objectiveValues = {objective}};
     result.aggregate = aggregator.aggregate(result.objectiveValues);
-    const double set = 0.0;
-    reporter_.recordEvaluation(std::span(&set, 1), result);
-    reporter_.evaluationFinished(std::span(&set, 1), result);
+    report(result);
     return result.objectiveValues;
   };
   const std::vector<std::vector<double>> sample{arrive(1, 4.0), arrive(2, 2.0), arrive(3, 9.0)};

@@ -35,11 +35,7 @@ ProgressState stateOf(std::string_view furtherRecords = "") {
 }
 
 ViewerSituation situationOf(RunPresence presence = RunPresence::running, double now = 1795226410.0) {
-  ViewerSituation situation;
-  situation.setupName = "basin";
-  situation.presence = presence;
-  situation.now = now;
-  return situation;
+  return {.setupName = "basin", .presence = presence, .now = now};
 }
 
 TEST(ScreenLayout, AnOrdinaryScreen) {
@@ -178,14 +174,10 @@ TEST(CoursePlot, OddCoursesAreDrawnOrLeftOut) {
 }
 
 TEST(DisplayText, NumbersForPeople) {
-  for (const auto& [seconds, text] : {std::pair{0.0, "0 s"},
-                                      {59.9, "59 s"},
-                                      {61.0, "1 min 1 s"},
-                                      {3600.0, "1 h"},
-                                      {93600.0, "1 d 2 h"},
-                                      {-5.0, "0 s"},
-                                      {1e300, "11574074 d 1 h"},
-                                      {static_cast<double>(NAN), "0 s"}}) {
+  const std::pair<double, const char*> durations[] = {
+      {0.0, "0 s"},         {59.9, "59 s"}, {61.0, "1 min 1 s"},       {3600.0, "1 h"},
+      {93600.0, "1 d 2 h"}, {-5.0, "0 s"},  {1e300, "11574074 d 1 h"}, {NAN, "0 s"}};
+  for (const auto& [seconds, text] : durations) {
     EXPECT_EQ(durationText(seconds), text);
   }
   EXPECT_EQ(roughDurationText(3725.0), "1 h");

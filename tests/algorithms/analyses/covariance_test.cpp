@@ -12,16 +12,11 @@
 namespace mirevo {
 namespace {
 
-SearchSpace spaceOf(std::vector<double> initial, TransformationType type = TransformationType::none) {
-  SearchSpace space;
-  for (std::size_t j = 0; j < initial.size(); ++j) {
-    space.names.push_back(fmt::format("b{}", j + 1));
-    space.lower.push_back(initial[j] - 1000.0);
-    space.upper.push_back(initial[j] + 1000.0);
-    space.transformation.push_back(type);
-  }
-  space.initial = std::move(initial);
-  return space;
+SearchSpace spaceOf(const std::vector<double>& initial, TransformationType type = TransformationType::none) {
+  const std::size_t n = initial.size();
+  std::vector<std::string> names;
+  for (std::size_t j = 1; j <= n; ++j) names.push_back(fmt::format("b{}", j));
+  return {names, initial, std::vector(n, -1000.0), std::vector(n, 1000.0), std::vector(n, type)};
 }
 
 // The straight line a + b x through x = 0..4: X'X = (5 10; 10 30), its inverse (0.6 -0.2; -0.2 0.1).

@@ -85,10 +85,8 @@ TEST(PlanPerturbations, NamesAStepThatRoundsAway) {
 
 /// Measures x² + 3y and e^z; objective functions 2y and z.
 EvaluationResult evaluate(const ParameterSet& p) {
-  EvaluationResult result;
-  result.measureValues = {p[0] * p[0] + 3.0 * p[1], std::exp(p[2])};
-  result.objectiveValues = {2.0 * p[1] + 0.1 * p[0], p[2]};
-  return result;
+  return {.measureValues = {p[0] * p[0] + 3.0 * p[1], std::exp(p[2])},
+          .objectiveValues = {2.0 * p[1] + 0.1 * p[0], p[2]}};
 }
 
 TEST(LocalSensitivity, HasDerivativesScaledCompositeAndRanking) {

@@ -27,11 +27,11 @@ class RankEvaluatorTest : public EvaluationTest {
   }
   void becomeReady(int rank) { job_.deliver(rank, RankMessage::ready, encode(ReadyMessage{"node", "/folder"})); }
   void answer(int rank) {
-    ResultMessage message;
-    message.result.measureValues = {running_.at(rank) - 1.0};
-    message.result.objectiveValues = {std::abs(running_.at(rank) - 1.0)};
-    message.result.aggregate = -99.0;  // the worker's own, which counts for nothing
-    job_.deliver(rank, RankMessage::result, encode(message));
+    const double measure = running_.at(rank) - 1.0;
+    // The aggregate is the worker's own, which counts for nothing.
+    const EvaluationResult result{
+        .measureValues = {measure}, .objectiveValues = {std::abs(measure)}, .aggregate = -99.0};
+    job_.deliver(rank, RankMessage::result, encode(ResultMessage{result}));
     running_.erase(rank);
   }
   /// The running workers answer one by one, those first whose set has the largest value.
@@ -59,6 +59,7 @@ TEST_F(RankEvaluatorTest, WhoeverIsFreeGetsTheNextSetAndResultsStandInTheOrderOf
   answerLargestFirst();
   const auto results = evaluate(master, {4.0, 2.0, 9.5, 3.0, 6.0});  // the third one violates a constraint
   EXPECT_THAT(measuresOf(results), ElementsAre(3.0, 1.0, kFailedRunValue, 2.0, 5.0));
+  EXPECT_EQ(results[0].aggregate, 3.0) << "the master's own";
   EXPECT_THAT(
       observer_.events,
       ElementsAre("Worker 2 is ready on node, process folder /folder", "Evaluation of parameter set No. 1 initiated",
@@ -78,20 +79,6 @@ TEST_F(RankEvaluatorTest, WhoeverIsFreeGetsTheNextSetAndResultsStandInTheOrderOf
   EXPECT_EQ(next.at(0).number, 6);
   EXPECT_EQ(job_.sent.back().rank, 1);
   EXPECT_EQ(launcher_.starts, 0);
-}
-
-TEST_F(RankEvaluatorTest, TheMasterComputesAggregatesAsItAloneKnowsTheTransformation) {
-  method_ = AggregationMethod::commonProbability;
-  RankEvaluator& master = makeMaster();
-  becomeReady(1);
-  answerLargestFirst();
-  auto sample = evaluate(master, {2.0, 3.0, 4.0});
-  EXPECT_TRUE(std::isnan(sample[0].aggregate));
-  master.settleAggregates(sample);
-  const auto later = evaluate(master, {2.0});
-  EXPECT_FALSE(std::isnan(later[0].aggregate));
-  EXPECT_EQ(later[0].aggregate, sample[0].aggregate);
-  EXPECT_NE(later[0].aggregate, -99.0);
 }
 
 TEST_F(RankEvaluatorTest, FailedRunsOfAllWorkersCountTogether) {
@@ -151,10 +138,8 @@ TEST_F(RankEvaluatorTest, TheWorkerOfAnEarlyFailureIsToldToKeepItsFolder) {
   becomeReady(1);
   job_.onReceive = [this](double) {
     if (running_.erase(1) == 0) return;
-    ResultMessage message;
-    message.result.measureValues = message.result.objectiveValues = {kFailedRunValue};
-    message.result.failure = EvaluationFailure{EvaluationFailure::Kind::timedOut, "too long", {}};
-    job_.deliver(1, RankMessage::result, encode(message));
+    job_.deliver(1, RankMessage::result,
+                 encode(ResultMessage{runner_->failedResult({EvaluationFailure::Kind::timedOut, "too long", {}})}));
   };
   evaluate(master, {2.0, 3.0});
   ASSERT_EQ(job_.sent.size(), 3U);  // set, keep, set

@@ -13,6 +13,7 @@ class RankWorkerTest : public EvaluationTest {
  protected:
   RankWorkerTest() : launcher_(batch) {
     job_.onSend = [this](const Message&) {
+      if (std::ssize(sets_) == keepAt_) job_.deliver(0, RankMessage::keepFolder, encode(KeepFolderMessage{17}));
       if (sets_.empty()) {
         job_.deliver(0, RankMessage::stop, {});
       } else {
@@ -24,11 +25,9 @@ class RankWorkerTest : public EvaluationTest {
   }
   /// The model with a = 2. The second run leaves a process behind, the third one does not end.
   static FakeLauncher::Batch batch(int start, const std::string&) {
-    FakeLauncher::Batch batch;
-    batch.seconds = start < 3 ? 10.0 : 1e9;
-    batch.leftBehind = start == 2 ? "a process" : "";
-    batch.write = [](const std::string& folder) { std::ofstream(folder + "/simulated.csv") << series(2.0); };
-    return batch;
+    return {.seconds = start < 3 ? 10.0 : 1e9,
+            .write = [](const std::string& folder) { std::ofstream(folder + "/simulated.csv") << series(2.0); },
+            .leftBehind = start == 2 ? "a process" : ""};
   }
   std::vector<RankMessage> sentTags() const {
     std::vector<RankMessage> tags;
@@ -44,6 +43,7 @@ class RankWorkerTest : public EvaluationTest {
   FakeLauncher launcher_;
   FakeJob job_{3};
   std::deque<double> sets_;
+  int keepAt_ = -1;  ///< the sets left when the folder of the last run is to be kept
 };
 
 TEST_F(RankWorkerTest, AnswersEachSetUntilItIsToldToStop) {
@@ -64,13 +64,7 @@ TEST_F(RankWorkerTest, KeepsTheFolderOfItsLastRunWhereTheMasterSaysSo) {
   description_.failedFolderPrefix = folder_ / "run_Failed";
   makeRunner(launcher_, 1);
   sets_ = {2.0, 3.0};
-  const auto sendNext = job_.onSend;
-  job_.onSend = [this, sendNext](const Message& message) {
-    if (message.tag == static_cast<int>(RankMessage::result) && sets_.size() == 1) {
-      job_.deliver(0, RankMessage::keepFolder, encode(KeepFolderMessage{17}));
-    }
-    sendNext(message);
-  };
+  keepAt_ = 1;
   runWorkerLoop(job_, *runner_);
   EXPECT_THAT(folder_.read("run_Failed17/parameters.txt"), EndsWith(" 2\n"));
   EXPECT_THAT(sentTags(), ElementsAre(RankMessage::ready, RankMessage::result, RankMessage::result));
@@ -82,20 +76,14 @@ TEST_F(RankWorkerTest, AWarningIsToldOnceWithTheNextResultThere) {
   description_.failedFolderPrefix = folder_ / "none/run_Failed";
   folder_.write("base/often.txt", "");
   FakeLauncher launcher([](int start, const std::string&) {
-    FakeLauncher::Batch batch;
-    batch.write = [start](const std::string& folder) {
+    return FakeLauncher::Batch{.write = [start](const std::string& folder) {
       std::ofstream(folder + "/simulated.csv") << series(2.0);
       if (start > 1) std::ofstream(folder + "/often.txt") << "written";
-    };
-    return batch;
+    }};
   });
   makeRunner(launcher, 1);
   sets_ = {2.0, 2.0, 2.0, 2.0};
-  const auto sendNext = job_.onSend;
-  job_.onSend = [this, sendNext](const Message& message) {
-    if (sets_.size() == 2) job_.deliver(0, RankMessage::keepFolder, encode(KeepFolderMessage{17}));
-    sendNext(message);
-  };
+  keepAt_ = 2;
   runWorkerLoop(job_, *runner_);
   ASSERT_EQ(job_.sent.size(), 5U);
   EXPECT_THAT(warningsOf(1), ElementsAre(HasSubstr("often.txt was not kept: the model run did not write it")));
@@ -117,12 +105,11 @@ TEST_F(RankWorkerTest, StopEndsAModelThatRuns) {
 }
 
 TEST(RankMessages, ContentThatWasCutOrHasMoreIsRefused) {
-  ResultMessage message;
-  message.result.measureValues = {1.0, -0.0};
-  message.result.failure = EvaluationFailure{EvaluationFailure::Kind::signal, "why", {"a", ""}};
-  message.result.warnings = {"careful"};
-  message.result.shownSeries = {{{10, 20}, {1.0F, 2.0F}}, {}};
-  message.leftBehind = "left";
+  const ResultMessage message{{.measureValues = {1.0, -0.0},
+                               .shownSeries = {{{10, 20}, {1.0F, 2.0F}}, {}},
+                               .failure = EvaluationFailure{EvaluationFailure::Kind::signal, "why", {"a", ""}},
+                               .warnings = {"careful"}},
+                              "left"};
   const std::string content = encode(message);
   EXPECT_EQ(encode(decodeResult(content)), content);
   for (std::size_t length = 0; length < content.size(); ++length) {

@@ -20,32 +20,24 @@ MemoryTimeSeries sampleSeries() {
 
 TEST(TimeSeriesObject, ValueAtATimeIsThatOfTheStepOrLinearBetween) {
   constexpr double kQuarterMillisecond = 0.25e-3 / 86400.0;
-  const std::tuple<double, std::optional<float>> cases[] = {
-      {-0.001, std::nullopt},        // before the axis
-      {-kQuarterMillisecond, 1.0F},  // the same time
-      {0.0, 1.0F},
-      {0.25, 1.5F},
-      {1.0 - kQuarterMillisecond, 3.0F},
-      {1.0 + kQuarterMillisecond, 3.0F},  // the step itself, though the next one is missing
-      {1.5, std::nullopt},                // beside a missing neighbour
-      {2.0, std::nullopt},
-      {2.5, std::nullopt},
-      {3.0, 4.0F},
-      {3.5, 5.0F},
-      {5.5, std::nullopt},
-      {6.0, std::nullopt},
-      {7.0, 0.5F},
-      {7.0 + kQuarterMillisecond, 0.5F},
-      {7.001, std::nullopt},
-      {std::numeric_limits<double>::quiet_NaN(), std::nullopt},
-  };
+  // Nothing lies before and behind the axis or beside a missing step; a quarter of a millisecond off is the same time.
+  const std::pair<std::optional<float>, std::vector<double>> cases[] = {
+      {std::nullopt, {-0.001, 1.5, 2.0, 2.5, 5.5, 6.0, 7.001, NAN}},
+      {1.0F, {-kQuarterMillisecond, 0.0}},
+      {1.5F, {0.25}},
+      {3.0F, {1.0 - kQuarterMillisecond, 1.0 + kQuarterMillisecond}},
+      {4.0F, {3.0}},
+      {5.0F, {3.5}},
+      {0.5F, {7.0, 7.0 + kQuarterMillisecond}}};
   const MemoryTimeSeries series = sampleSeries();
-  for (const auto& [days, expected] : cases) {
-    EXPECT_EQ(valueAt(series, 1, days), expected) << days;
-    // Whatever step the search begins at, it ends at the same one.
-    for (std::size_t start = 0; start < 9; ++start) {
-      std::size_t hint = start;
-      EXPECT_EQ(valueAt(series, 1, days, hint), expected) << days << " from " << start;
+  for (const auto& [expected, times] : cases) {
+    for (const double days : times) {
+      EXPECT_EQ(valueAt(series, 1, days), expected) << days;
+      // Whatever step the search begins at, it ends at the same one.
+      for (std::size_t start = 0; start < 9; ++start) {
+        std::size_t hint = start;
+        EXPECT_EQ(valueAt(series, 1, days, hint), expected) << days << " from " << start;
+      }
     }
   }
 }

@@ -1,13 +1,8 @@
 #include "run/results/result_table.h"
 
-#include <bit>
-#include <cmath>
-#include <limits>
 #include <tuple>
 
 #include <gtest/gtest.h>
-
-#include "common/text.h"
 
 namespace mirevo {
 namespace {
@@ -15,23 +10,11 @@ namespace {
 const ResultColumns kColumns{{"X1"}, {"RMSE"}, {}};
 const std::string kHead = "# A title\n# Mirevo\nEvaluation\tStatus\tX1\tRMSE\tAggregate\n";
 
-TEST(ResultTable, EveryNumberComesBackAsItWas) {
-  std::string text = kHead;
-  const std::vector<double> values{0.1,          -0.0,     1e30, 5e-324, std::numeric_limits<double>::max(),
-                                   std::nan(""), -INFINITY};
-  for (std::size_t i = 0; i < values.size(); ++i) {
-    text += std::to_string(i + 1) + "\tOK\t" + formatReal(values[i]) + "\t1\t2\n";
-  }
-  text += "# Cancelled\n# Best evaluation: 1\n";
-  const ResultTable table = readResultTable(text, kColumns);
-  ASSERT_EQ(table.rows.size(), values.size());
-  for (std::size_t i = 0; i < values.size(); ++i) {
-    EXPECT_EQ(table.rows[i].number, static_cast<int>(i) + 1);
-    EXPECT_EQ(std::isnan(values[i]), std::isnan(table.rows[i].parameters[0]));
-    if (!std::isnan(values[i])) {
-      EXPECT_EQ(std::bit_cast<std::uint64_t>(table.rows[i].parameters[0]), std::bit_cast<std::uint64_t>(values[i]));
-    }
-  }
+TEST(ResultTable, RowsHaveTheirNumbersBetweenHeadAndClosingLines) {
+  const std::string rows = "1\tOK\t0.1\t1\t2\n2\tFAILED\tNaN\t-Inf\t5e-324\n";
+  const ResultTable table = readResultTable(kHead + rows + "# Cancelled\n# Best evaluation: 1\n", kColumns);
+  ASSERT_EQ(table.rows.size(), 2U);
+  EXPECT_EQ(resultRowText(table.rows[0]) + "\n" + resultRowText(table.rows[1]) + "\n", rows);
   EXPECT_EQ(table.headLines, (std::vector<std::string>{"A title", "Mirevo"}));
   EXPECT_EQ(table.closingLines, (std::vector<std::string>{"Cancelled", "Best evaluation: 1"}));
 }

@@ -16,13 +16,12 @@ namespace {
 class SeriesRecorderTest : public ::testing::Test {
  protected:
   SeriesRecorder recorder() {
-    RecordedSeries run;
-    run.headLines = {"Title"};
-    run.measures = {"flow"};
-    run.observations = {{{10, 30}, {1.0F, 3.0F}}};
-    run.periodFirst = 10;
-    run.periodLast = 30;
-    run.initialValues = {0.5};
+    RecordedSeries run{.headLines = {"Title"},
+                       .measures = {"flow"},
+                       .observations = {{{10, 30}, {1.0F, 3.0F}}},
+                       .periodFirst = 10,
+                       .periodLast = 30,
+                       .initialValues = {0.5}};
     return {folder_ / "s_Series.dat", std::move(run), [this] { return now_; },
             [this](std::string_view text) { warnings_.emplace_back(text); }};
   }
@@ -30,9 +29,7 @@ class SeriesRecorderTest : public ::testing::Test {
   /// An evaluation whose simulated series is its number at the seconds 0 to 40.
   void evaluate(SeriesRecorder& to, int number, double aggregate, bool isInitial = false, double value = -1.0,
                 bool hasSeries = true) {
-    EvaluationResult result;
-    result.number = number;
-    result.aggregate = aggregate;
+    EvaluationResult result{.number = number, .aggregate = aggregate};
     const auto simulated = static_cast<float>(number);
     if (hasSeries) result.shownSeries = {{{0, 20, 40}, {simulated, simulated, simulated}}};
     const std::vector<double> values{isInitial ? 0.5 : value < 0.0 ? number : value};

@@ -10,10 +10,7 @@ namespace {
 TEST(UnusedParameterWarnings, FollowDependentParametersFromTheTemplatesOn) {
   std::vector<ModelParameter> parameters;
   const auto add = [&parameters](const char* name, ParameterType type, const char* equation = "") {
-    parameters.emplace_back();
-    parameters.back().name = name;
-    parameters.back().parameterType = type;
-    parameters.back().equation = equation;
+    parameters.push_back({.parameterType = type, .name = name, .equation = equation});
   };
   add("direct", ParameterType::variable);
   add("througha", ParameterType::variable);

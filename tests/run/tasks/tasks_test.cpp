@@ -17,14 +17,7 @@ namespace mirevo {
 namespace {
 
 ModelParameter parameter(const char* name, ParameterType type, TransformationType transformation) {
-  ModelParameter result;
-  result.name = name;
-  result.parameterType = type;
-  result.transformationType = transformation;
-  result.lowerBound = 0.5;
-  result.initialValue = 1.5;
-  result.upperBound = 9.5;
-  return result;
+  return {1.5, 0.5, 9.5, transformation, type, 0.0, name};
 }
 
 class TasksTest : public ::testing::Test {
