@@ -94,9 +94,10 @@ class SetupFixture : public testing::Test {
   }
 
   /// What reading writes to the log, whether it fails or not.
-  std::string logOf(std::string_view edits) {
+  std::string logOf(std::string_view edits) { return logOfText(edited(edits)); }
+  std::string logOfText(const std::string& text) {
     RunLog log;
-    refusalOf([&] { readSetup(folder_ / "setup.kdx", edited(edits), log); });
+    refusalOf([&] { readSetup(folder_ / "setup.kdx", text, log); });
     std::string reason;
     EXPECT_TRUE(log.open(folder_ / "setup.log", reason)) << reason;
     return withoutFolder(folder_.read("setup.log"));

@@ -6,13 +6,10 @@
 
 #include <gtest/gtest.h>
 
-#include "algorithms/searches/dds.h"
-#include "algorithms/searches/pse.h"
 #include "common/files.h"
 #include "run/access/setup_value.h"
 #include "run/setup/run_keywords.h"
 #include "run/setup/setup_reference.h"
-#include "run/tasks/optimisation_task.h"
 
 namespace mirevo {
 namespace {
@@ -38,38 +35,6 @@ TEST(SetupSchema, EveryRowIsSound) {
       EXPECT_TRUE(real == nullptr || row.facts.range.text().empty() || row.facts.range.contains(*real)) << name;
     }
   }
-}
-
-/// Fills settings with the defaults of their keywords.
-template <class Settings>
-Settings withDefaults(const BoundSection& section, Settings& settings) {
-  for (const KeywordRow& row : section.row->keywords) {
-    if (!row.isRequired() && !row.isLeftOutByDefault()) row.store(section.settings, defaultSetupValue(row));
-  }
-  return settings;
-}
-
-// The settings structs carry defaults, too: for callers that read no setup.
-TEST(SetupSchema, DefaultsAreThoseOfTheSettings) {
-  StoppingCriteria stopping{.loopsConvergence = -1, .minChange = -1};
-  withDefaults({stoppingSection(), stopping}, stopping);
-  EXPECT_EQ(stopping.loopsConvergence, StoppingCriteria{}.loopsConvergence);
-  EXPECT_EQ(stopping.minChange, StoppingCriteria{}.minChange);
-  SurrogateSettings surrogate{-1, -1, SurrogateModelType{-1}, -1};
-  withDefaults({surrogateSection(), surrogate}, surrogate);
-  EXPECT_EQ(surrogate.samplingRate, SurrogateSettings{}.samplingRate);
-  EXPECT_EQ(surrogate.neighbourhoodSize, SurrogateSettings{}.neighbourhoodSize);
-  EXPECT_EQ(surrogate.modelType, SurrogateSettings{}.modelType);
-  EXPECT_EQ(surrogate.initialGenerations, SurrogateSettings{}.initialGenerations);
-  PseMethod pse;
-  pse.settings = {0, -1.0, -1.0};
-  withDefaults(pse.section(), pse.settings);
-  EXPECT_EQ(pse.settings.reflectionProbability, PseSettings{}.reflectionProbability);
-  EXPECT_EQ(pse.settings.contractionProbability, PseSettings{}.contractionProbability);
-  DdsMethod dds;
-  dds.settings.perturbation = -1.0;
-  withDefaults(dds.section(), dds.settings);
-  EXPECT_EQ(dds.settings.perturbation, DdsSettings{}.perturbation);
 }
 
 TEST(SetupSchema, NamesOfItemSectionsLoseTheirNumber) {

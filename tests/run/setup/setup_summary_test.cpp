@@ -12,10 +12,7 @@ using SetupSummaryTest = SetupFixture;
 TEST_F(SetupSummaryTest, SaysWhatTheRunIsAboutToDo) {
   RunConfig config = read("Weight = 0.75 => Weight = 0.75\nStandard_Deviation = 2.5");
   config.baseFolder = "/base";
-  SearchSpace space;
-  space.names = {"Depth", "Rate"};
-  space.lower = {4.605170185988092, 0.0};
-  space.upper = {6.75, 1.0};
+  const SearchSpace space{.names = {"Depth", "Rate"}, .lower = {4.605170185988092, 0.0}, .upper = {6.75, 1.0}};
   const int order[] = {1, 3, 2};
   EXPECT_EQ(
       setupSummary(config, space, order),
@@ -44,18 +41,21 @@ TEST_F(SetupSummaryTest, SaysWhatTheRunIsAboutToDo) {
       "Simultaneous simulations: 4");
 }
 
-TEST_F(SetupSummaryTest, TheTaskSaysWhatIsRun) {
-  const std::pair<const char*, const char*> cases[] = {
-      {"Option = 2 => 0 & Scenario_Type = 1 => 0", "Scenario runs: Single run using initial parameter set"},
-      {"Option = 2 => 0", "Scenario runs: Multiple runs"},
-      {"Option = 2 => 1 & Differencing = 1 => 0",
+TEST_F(SetupSummaryTest, TheTaskSaysWhatIsRunAndHowOften) {
+  const std::tuple<const char*, int, const char*> cases[] = {
+      {"Option = 2 => 0 & Scenario_Type = 1 => 0", 1, "Scenario runs: Single run using initial parameter set"},
+      {"Option = 2 => 0", 1, "Scenario runs: Multiple runs"},
+      {"Option = 2 => 1 & Differencing = 1 => 0", 3,
        "Sensitivity analysis: Local sensitivity analysis, forward differences"},
-      {"Option = 2 => 1", "Sensitivity analysis: Local sensitivity analysis, central differences"},
-      {"Option = 2 => 3 & Uncertainty_Type = 1 => 0", "Uncertainty analysis: simple random sampling"},
-      {"Option = 2 => 3", "Uncertainty analysis: Latin hypercube sampling"},
-      {"Option = 2 => 4", "none"},
+      {"Option = 2 => 1", 5, "Sensitivity analysis: Local sensitivity analysis, central differences"},
+      {"Option = 2 => 3 & Uncertainty_Type = 1 => 0", 200, "Uncertainty analysis: simple random sampling"},
+      {"Option = 2 => 3", 200, "Uncertainty analysis: Latin hypercube sampling"},
+      {"Option = 2 => 4", 0, "none"},
   };
-  for (const auto& [edits, description] : cases) EXPECT_EQ(read(edits).taskDescription(), description);
+  for (const auto& [edits, planned, description] : cases) {
+    EXPECT_EQ(read(edits).plannedEvaluations(), planned) << edits;
+    EXPECT_EQ(read(edits).taskDescription(), description);
+  }
 }
 
 }  // namespace
