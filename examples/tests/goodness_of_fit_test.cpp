@@ -20,15 +20,5 @@ TEST(GoodnessOfFit, AgreesWithAWorkedExample) {
   EXPECT_DOUBLE_EQ(fit.kge, 1.0 - std::sqrt((r - 1) * (r - 1) + std::pow(std::sqrt(1.6) - 1, 2) + 0.04));
 }
 
-TEST(GoodnessOfFit, IsOneForAPerfectSimulationAndZeroNseForTheMean) {
-  const std::array observed{3.0, 1.0, 4.0, 1.0, 5.0};
-  const GoodnessOfFit perfect = goodnessOfFit(observed, observed);
-  EXPECT_EQ(perfect.nse, 1.0);
-  EXPECT_NEAR(perfect.kge, 1.0, 1e-15);
-  EXPECT_EQ(perfect.rmse, 0.0);
-  const std::array mean{2.8, 2.8, 2.8, 2.8, 2.8};
-  EXPECT_NEAR(goodnessOfFit(mean, observed).nse, 0.0, 1e-15);
-}
-
 }  // namespace
 }  // namespace mirevo::examples

@@ -1,18 +1,10 @@
 // Any bytes as a CSV series: no crash, and what is accepted keeps the promises of TimeSeriesObject.
 
 #include <cstdint>
-#include <cstdlib>
 #include <string>
 
 #include "platform/series/csv_time_series.h"
-
-namespace {
-
-void require(bool promise) {
-  if (!promise) std::abort();
-}
-
-}  // namespace
+#include "require.h"
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
   mirevo::CsvTimeSeries series;

@@ -1,17 +1,13 @@
 // Any bytes as a message file: no crash, the same state whatever pieces they come in, and a screen that fits.
 
 #include <cstdint>
-#include <cstdlib>
 #include <string_view>
 
+#include "require.h"
 #include "viewer/progress_records.h"
 #include "viewer/screen_layout.h"
 
 namespace {
-
-void require(bool promise) {
-  if (!promise) std::abort();
-}
 
 void requireFit(const mirevo::ProgressState& state, mirevo::ScreenSize size, mirevo::CharacterSet characters) {
   mirevo::ViewerSituation situation;

@@ -2,10 +2,10 @@
 // written anew, as a restart does, are the same rows.
 
 #include <cstdint>
-#include <cstdlib>
 #include <string>
 
 #include "common/text.h"
+#include "require.h"
 #include "run/results/result_table.h"
 
 namespace {
@@ -13,10 +13,6 @@ namespace {
 using mirevo::ResultColumns;
 using mirevo::ResultRow;
 using mirevo::ResultTable;
-
-void require(bool promise) {
-  if (!promise) std::abort();
-}
 
 /// The columns of the first line that is a header row with at least one of a parameter, or none.
 ResultColumns columnsOf(std::string_view text) {

@@ -25,7 +25,7 @@ namespace {
 
 /// In a process of its own: logs opened and handlers installed as the run does it, then `act`.
 template <typename Act>
-void actWithHandlers(const TemporaryFolder& folder, const char* buildMode, const char* frontEnd, Act act) {
+void actWithHandlers(const TemporaryFolder& folder, Act act, const char* buildMode = "", const char* frontEnd = "WIN") {
   const auto open = [&](const char* name) {
     return ::open((folder / name).c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_APPEND, 0666);
   };
@@ -43,11 +43,7 @@ void actWithHandlers(const TemporaryFolder& folder, const char* buildMode, const
   ::_exit(0);
 }
 
-const struct {
-  int signal;
-  const char* message;
-  RunStage stage;
-} kSignals[] = {
+const std::tuple<int, const char*, RunStage> kSignals[] = {
     {SIGABRT, "Abnormal termination", RunStage::failed},  {SIGILL, "Illegal instruction", RunStage::failed},
     {SIGINT, "Control-C send", RunStage::cutOff},         {SIGSEGV, "Illegal storage access", RunStage::failed},
     {SIGTERM, "Termination request", RunStage::cutOff},   {SIGHUP, "Termination request", RunStage::cutOff},
@@ -57,7 +53,7 @@ const struct {
 TEST(SignalHandlers, EverySignalEndsTheRunWithItsMessageInEveryPlace) {
   for (const auto& [signal, message, stage] : kSignals) {
     const TemporaryFolder folder;
-    EXPECT_EXIT(actWithHandlers(folder, "", "WIN", [signal = signal] { ::raise(signal); }),
+    EXPECT_EXIT(actWithHandlers(folder, [signal = signal] { ::raise(signal); }),
                 ::testing::ExitedWithCode(128 + signal), fmt::format("^run_tests: {}\n$", message));
     EXPECT_EQ(folder.read("run.log"), fmt::format("\n{}\n", message));
     EXPECT_EQ(folder.read("results"), fmt::format("# {}\n", message));
@@ -73,8 +69,9 @@ TEST(SignalHandlers, EverySignalEndsTheRunWithItsMessageInEveryPlace) {
 TEST(SignalHandlers, AnUnattendedRunShowsTheMessageOnlyWithoutAFrontEnd) {
   for (const char* frontEnd : {"WIN", "QMON", ""}) {
     const TemporaryFolder folder;
-    EXPECT_EXIT(actWithHandlers(folder, "NIGHT", frontEnd, [] { ::raise(SIGTERM); }), ::testing::ExitedWithCode(143),
-                "^$");
+    EXPECT_EXIT(actWithHandlers(
+                    folder, [] { ::raise(SIGTERM); }, "NIGHT", frontEnd),
+                ::testing::ExitedWithCode(143), "^$");
     EXPECT_EQ(folder.read("stdout"), *frontEnd == '\0' ? "Termination request\n" : "");
     EXPECT_EQ(folder.read("termination.log"), "Termination request\nAbnormal completion\n");
   }
@@ -86,7 +83,7 @@ TEST(SignalHandlers, TheReasonIsLoggedBeforeTheModelIsHalted) {
     signalState.haltProcesses = [] { writeLineFromSignal(signalState.runLogDescriptor, "halted"); };
     ::raise(SIGINT);
   };
-  EXPECT_EXIT(actWithHandlers(folder, "", "WIN", haltWhileSayingSo), ::testing::ExitedWithCode(130), "");
+  EXPECT_EXIT(actWithHandlers(folder, haltWhileSayingSo), ::testing::ExitedWithCode(130), "");
   EXPECT_EQ(folder.read("run.log"), "\nControl-C send\nhalted\n");
 }
 
@@ -99,7 +96,7 @@ TEST(SignalHandlers, ARunUnderNohupOutlivesItsTerminal) {
       ::raise(signal);
     }
   };
-  EXPECT_EXIT(actWithHandlers(folder, "", "WIN", hangUp), ::testing::ExitedWithCode(0), "^$");
+  EXPECT_EXIT(actWithHandlers(folder, hangUp), ::testing::ExitedWithCode(0), "^$");
 }
 
 /// A library's thread must not take it either, as the kernel lets one do where the main thread does not.
@@ -114,7 +111,7 @@ TEST(SignalHandlers, ARequestWaitsForTheEndOfAStepOfTheMainThread) {
     }
     other.join();
   };
-  EXPECT_EXIT(actWithHandlers(folder, "", "WIN", askInTheMiddle), ::testing::ExitedWithCode(143), "");
+  EXPECT_EXIT(actWithHandlers(folder, askInTheMiddle), ::testing::ExitedWithCode(143), "");
   EXPECT_EQ(folder.read("results"), "whole record\n# Termination request\n");
 }
 
@@ -141,7 +138,7 @@ TEST(SignalHandlers, TrappedZeroDivideEndsTheRunAndUnderflowDoesNot) {
     volatile double result = 1.0 / zero;
     static_cast<void>(result);
   };
-  EXPECT_EXIT(actWithHandlers(folder, "", "WIN", divide), ::testing::ExitedWithCode(136), "Zero divide");
+  EXPECT_EXIT(actWithHandlers(folder, divide), ::testing::ExitedWithCode(136), "Zero divide");
 
   const auto underflow = [] {
     ::feenableexcept(FE_UNDERFLOW);
@@ -149,22 +146,21 @@ TEST(SignalHandlers, TrappedZeroDivideEndsTheRunAndUnderflowDoesNot) {
     volatile double result = tiny * tiny;
     std::fprintf(stderr, "went on with %g\n", result);
   };
-  EXPECT_EXIT(actWithHandlers(folder, "", "WIN", underflow), ::testing::ExitedWithCode(0), "went on with 0");
+  EXPECT_EXIT(actWithHandlers(folder, underflow), ::testing::ExitedWithCode(0), "went on with 0");
 }
 #endif
 
 TEST(StopRun, TheCompletionLineGoesToATerminationLogThatIsSet) {
   const TemporaryFolder folder;
   for (const int exitCode : {0, 1}) {
-    EXPECT_EXIT(actWithHandlers(folder, "", "WIN", [&] { stopRun(exitCode); }), ::testing::ExitedWithCode(exitCode),
-                "");
+    EXPECT_EXIT(actWithHandlers(folder, [&] { stopRun(exitCode); }), ::testing::ExitedWithCode(exitCode), "");
     EXPECT_EQ(folder.read("termination.log"), exitCode == 0 ? "Successful completion\n" : "Abnormal completion\n");
   }
   const auto without = [] {
     setTerminationLogUnit(0);
     stopRun(0);
   };
-  EXPECT_EXIT(actWithHandlers(folder, "", "WIN", without), ::testing::ExitedWithCode(0), "");
+  EXPECT_EXIT(actWithHandlers(folder, without), ::testing::ExitedWithCode(0), "");
   EXPECT_EQ(folder.read("termination.log"), "");
 }
 
@@ -181,7 +177,7 @@ TEST(StopRun, ATerminationLogIsThatOfTheLatestRunAndAnEarlierOneStillWritesItsOw
     stopRun(0);
   };
   folder.write("a.log", "of a run long ago\n");
-  EXPECT_EXIT(actWithHandlers(folder, "", "WIN", runTwice), ::testing::ExitedWithCode(0), "");
+  EXPECT_EXIT(actWithHandlers(folder, runTwice), ::testing::ExitedWithCode(0), "");
   EXPECT_EQ(folder.read("a.log"), "Successful completion\n");
   EXPECT_FALSE(folder.exists("b.log"));
   EXPECT_THAT(openTerminationLog(folder / "no/such/folder/a.log"), StartsWith("Unable to open"));

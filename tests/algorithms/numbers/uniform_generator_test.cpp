@@ -3,6 +3,7 @@
 #include <array>
 #include <cstdint>
 #include <limits>
+#include <tuple>
 #include <vector>
 
 #include <gtest/gtest.h>
@@ -10,13 +11,8 @@
 namespace mirevo {
 namespace {
 
-// Computed apart from this program, with integers of unlimited size.
-struct Reference {
-  std::int32_t seed;
-  std::array<double, 4> first;
-  double thousandth;
-};
-const Reference kReferences[] = {
+// Seeds, the first four deviates and the thousandth, computed apart from this program with integers of unlimited size.
+const std::tuple<std::int32_t, std::array<double, 4>, double> kReferences[] = {
     {0, {0.27427201467933515, 0.5690608555635296, 0.32530293667380894, 0.056088919582193884}, 0.33302477141400566},
     {1, {0.3900425093484263, 0.1711484132940249, 0.6423839028188294, 0.8688522382590367}, 0.940285031434319},
     {-5, {0.15150577606895058, 0.829547319893649, 0.6959620382375513, 0.6661892255246773}, 0.3223007856249504},
@@ -33,13 +29,13 @@ const Reference kReferences[] = {
 /// All at once, as no generator may disturb another.
 TEST(UniformGenerator, GivesTheReferenceStream) {
   std::vector<UniformGenerator> generators;
-  for (const Reference& reference : kReferences) generators.emplace_back(reference.seed);
+  for (const auto& reference : kReferences) generators.emplace_back(std::get<0>(reference));
   for (std::size_t k = 0; k < 1000; ++k) {
     for (std::size_t i = 0; i < generators.size(); ++i) {
-      const Reference& reference = kReferences[i];
+      const auto& [seed, first, thousandth] = kReferences[i];
       const double deviate = generators[i].next();
       if (k < 4 || k == 999) {
-        EXPECT_EQ(deviate, k < 4 ? reference.first[k] : reference.thousandth) << reference.seed;
+        EXPECT_EQ(deviate, k < 4 ? first[k] : thousandth) << seed;
       }
     }
   }

@@ -53,6 +53,13 @@ constexpr StoppingCriteria onBudget(int evaluations) {
   return {evaluations, 1000000, 0.0};
 }
 
+/// The summary of a search by so many complexes, from the seed.
+SearchSummary search(Kind kind, int complexes, const SearchBounds& bounds, int budget, FunctionEvaluator& evaluator,
+                     int seed, ProposalSelector* selector = nullptr) {
+  UniformGenerator random(seed);
+  return runToEnd(*makeSearch(kind, complexes, {bounds, onBudget(budget), {}, {}, evaluator, random, selector}));
+}
+
 class EitherSearch : public ::testing::TestWithParam<Kind> {};
 INSTANTIATE_TEST_SUITE_P(Searches, EitherSearch, ::testing::Values(Kind::sce, Kind::pse),
                          [](const auto& instance) { return instance.param == Kind::sce ? "Sce" : "Pse"; });
@@ -63,10 +70,7 @@ TEST_P(EitherSearch, FindsPublishedOptima) {
     for (const int seed : {1, 2, 3}) {
       const auto function = testing::shifted(testing::testFunction(name), seed);
       FunctionEvaluator evaluator([&](const ParameterSet& x) { return resultOf(function.value(x)); });
-      UniformGenerator random(seed);
-      const auto search =
-          makeSearch(GetParam(), complexes, {boundsOf(function), onBudget(budget), {}, {}, evaluator, random});
-      const SearchSummary summary = runToEnd(*search);
+      const SearchSummary summary = search(GetParam(), complexes, boundsOf(function), budget, evaluator, seed);
       EXPECT_NEAR(summary.bestResult.aggregate, function.optimalValue, 1e-3) << name << ", seed " << seed;
       EXPECT_EQ(function.value(summary.best), summary.bestResult.aggregate);
     }
@@ -76,10 +80,7 @@ TEST_P(EitherSearch, FindsPublishedOptima) {
 TEST_P(EitherSearch, KeepsToTheBudgetExactly) {
   for (const int budget : {1, 3, 10, 11, 12, 13, 57, 200}) {
     FunctionEvaluator evaluator([](const ParameterSet& x) { return resultOf(testing::rosenbrock(x)); });
-    UniformGenerator random(4);
-    const SearchBounds bounds{{-5, -2}, {5, 8}, {0, 0}};
-    const auto search = makeSearch(GetParam(), 2, {bounds, onBudget(budget), {}, {}, evaluator, random});
-    const SearchSummary summary = runToEnd(*search);
+    const SearchSummary summary = search(GetParam(), 2, {{-5, -2}, {5, 8}, {0, 0}}, budget, evaluator, 4);
     EXPECT_EQ(evaluator.evaluationCount, budget);
     EXPECT_EQ(summary.evaluationCount, budget);
     // A population of one has converged as well, and that test is the last one.
@@ -106,14 +107,11 @@ TEST_P(EitherSearch, NeitherFixedParametersNorFailuresStallItOrMakeANotANumber) 
   for (const auto& [name, function] : functions) {
     for (const int modelType : {-1, 0, 1}) {  // without, and with a surrogate model
       FunctionEvaluator evaluator(function);
-      UniformGenerator random(6);
       const SearchBounds bounds{{-1, 0.1, -1}, {1, 0.1, 1}, {0.9, 0.1, 0.9}};
       ProposalSelector selector({50, 20, SurrogateModelType{modelType}, 1}, bounds);
       const int budget = modelType == 1 ? 200 : 1500;
-      const auto search =
-          makeSearch(GetParam(), 2,
-                     {bounds, {budget, 1000000, 0.0}, {}, {}, evaluator, random, modelType < 0 ? nullptr : &selector});
-      const SearchSummary summary = runToEnd(*search);
+      ProposalSelector* const chooser = modelType < 0 ? nullptr : &selector;
+      const SearchSummary summary = search(GetParam(), 2, bounds, budget, evaluator, 6, chooser);
       EXPECT_LE(summary.evaluationCount, budget) << name;
       EXPECT_TRUE(std::isfinite(summary.populationRange)) << name;
       EXPECT_TRUE(std::isfinite(summary.populationSpread)) << name;
@@ -132,9 +130,9 @@ TEST_P(EitherSearch, NeitherFixedParametersNorFailuresStallItOrMakeANotANumber) 
 
 TEST_P(EitherSearch, StopsWhereNoParameterCanVary) {
   FunctionEvaluator evaluator([](const ParameterSet&) { return resultOf(1.0); });
-  UniformGenerator random(1);
-  const auto search = makeSearch(GetParam(), 2, {{{2, 3}, {2, 3}, {2, 3}}, onBudget(500), {}, {}, evaluator, random});
-  EXPECT_EQ(runToEnd(*search).terminationMessage, "Optimisation terminated: Population converged");
+  const SearchBounds nowhere{{2, 3}, {2, 3}, {2, 3}};
+  EXPECT_EQ(search(GetParam(), 2, nowhere, 500, evaluator, 1).terminationMessage,
+            "Optimisation terminated: Population converged");
 }
 
 TEST_P(EitherSearch, RefusesStepsAndSettingsThatMakeNoSense) {
@@ -158,11 +156,9 @@ TEST_P(EitherSearch, IsHelpedByTheSurrogateModelWithinTheSameBudgetAndRules) {
   for (const int type : {-1, 0, 1}) {
     for (int seed = 1; seed <= 10; ++seed) {
       FunctionEvaluator evaluator([](const ParameterSet& x) { return resultOf(testing::rosenbrock(x)); });
-      UniformGenerator random(seed);
       ProposalSelector selector({25, 0, SurrogateModelType{type}, 1}, bounds);
-      const auto search =
-          makeSearch(GetParam(), 4, {bounds, onBudget(400), {}, {}, evaluator, random, type < 0 ? nullptr : &selector});
-      const SearchSummary summary = runToEnd(*search);
+      ProposalSelector* const chooser = type < 0 ? nullptr : &selector;
+      const SearchSummary summary = search(GetParam(), 4, bounds, 400, evaluator, seed, chooser);
       EXPECT_LE(evaluator.evaluationCount, 400);
       // What is reported was run, never predicted.
       EXPECT_EQ(summary.bestResult.aggregate, testing::rosenbrock(summary.best));
@@ -213,8 +209,7 @@ TEST(Sce, ReflectsTheWorstPointOfTheSubcomplexFirst) {
 
 TEST(Sce, ContractsWhereTheReflectionIsNoBetterAndElseTakesARandomPoint) {
   // Every new point is worse than the three of the sample.
-  int count = 0;
-  FunctionEvaluator counting([&count](const ParameterSet&) { return resultOf(++count); });
+  FunctionEvaluator counting([&](const ParameterSet&) { return resultOf(counting.evaluationCount + 1); });
   UniformGenerator random(1);
   Sce sce({1, 3, 1}, {3}, fromThreePoints(counting, random));
   ASSERT_EQ(sce.initialise(), kSearchOk);
@@ -252,8 +247,7 @@ TEST(Pse, RunsAGenerationInOneBatch) {
 
 /// Every new point is worse than the sample, so that the step of the worst point goes on from move to move.
 TEST(Pse, ReflectsThenContractsAndGivesAStuckPointUp) {
-  int count = 0;
-  FunctionEvaluator counting([&count](const ParameterSet&) { return resultOf(++count); });
+  FunctionEvaluator counting([&](const ParameterSet&) { return resultOf(counting.evaluationCount + 1); });
   UniformGenerator random(1);
   Pse pse({3, 1.0, 0.0}, {3}, fromThreePoints(counting, random));
   ASSERT_EQ(pse.initialise(), kSearchOk);
@@ -274,8 +268,7 @@ TEST(Pse, ReflectsThenContractsAndGivesAStuckPointUp) {
 TEST(Pse, AMutationLeavesAPointItsPlaceInTheMoves) {
   int reflections = 0;
   for (int seed = 1; seed <= 20; ++seed) {
-    int count = 0;
-    FunctionEvaluator counting([&count](const ParameterSet&) { return resultOf(++count); });
+    FunctionEvaluator counting([&](const ParameterSet&) { return resultOf(counting.evaluationCount + 1); });
     UniformGenerator random(seed);
     Pse pse({3, 0.5, 0.0}, {3}, fromThreePoints(counting, random));
     ASSERT_EQ(pse.initialise(), kSearchOk);

@@ -234,18 +234,16 @@ TEST_F(PosixProcessLauncherTest, HaltingIsGentleFirstAndThenSure) {
 
 TEST_F(PosixProcessLauncherTest, NothingOutlivesTheProgram) {
   // Each way for a program to end, with two slots running a shell, a daemon, a model and a stubborn grandchild each.
-  const std::pair<const char*, std::function<void()>> cases[] = {
-      {"kill -9", [] { ::kill(::getpid(), SIGKILL); }},
-      {"leaves from a signal handler",
-       [] {
-         ::signal(SIGTERM, [](int) {
-           haltProcessesFromSignal();
-           ::_exit(1);
-         });
-         ::raise(SIGTERM);
-       }},
-      {"exits without a word", [] { ::_exit(0); }},
-  };
+  const std::pair<const char*, std::function<void()>> cases[] = {{"kill -9", [] { ::kill(::getpid(), SIGKILL); }},
+                                                                 {"leaves from a signal handler",
+                                                                  [] {
+                                                                    ::signal(SIGTERM, [](int) {
+                                                                      haltProcessesFromSignal();
+                                                                      ::_exit(1);
+                                                                    });
+                                                                    ::raise(SIGTERM);
+                                                                  }},
+                                                                 {"exits without a word", [] { ::_exit(0); }}};
   initialise(
       "trap '' TERM\nsetsid sh -c 'echo $$ >daemon.txt; exec sleep 600' &\n"
       "while ! [ -s daemon.txt ]; do sleep 0.01; done\n" MIREVO_TEST_MODEL

@@ -78,14 +78,12 @@ TEST(ProcessFolder, LinksLeadWhereTheyShould) {
   const std::string copy = folder / "setup/run_Process1";
   makeProcessFolder(base, copy, folder / "setup/run_Process");
 
-  const std::tuple<const char*, std::string> cases[] = {
-      {"/inside_relative", "data/x.txt"},
-      {"/inside_absolute", copy + "/data/x.txt"},
-      {"/outside_relative", folder / "setup/model/shared/y.txt"},
-      {"/outside_absolute", folder / "setup/model/shared/y.txt"},
-      {"/dangling", "nowhere"},
-      {"/data/loop", "."},
-  };
+  const std::tuple<const char*, std::string> cases[] = {{"/inside_relative", "data/x.txt"},
+                                                        {"/inside_absolute", copy + "/data/x.txt"},
+                                                        {"/outside_relative", folder / "setup/model/shared/y.txt"},
+                                                        {"/outside_absolute", folder / "setup/model/shared/y.txt"},
+                                                        {"/dangling", "nowhere"},
+                                                        {"/data/loop", "."}};
   for (const auto& [name, target] : cases) EXPECT_EQ(fs::read_symlink(copy + name).string(), target) << name;
 }
 
