@@ -1,6 +1,6 @@
-// node screenshots.mjs <report.html> <folder>: pictures of a report's parts, those that it has.
+// node report-screenshots.mjs <report.html> <folder>: pictures of a report's parts, those that it has.
 import { join } from 'node:path';
-import { openBrowser } from './browser.mjs';
+import { openBrowser } from '../tests/report/page/browser.mjs';
 
 const [report, folder] = process.argv.slice(2);
 const kPictures = [
