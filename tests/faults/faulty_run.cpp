@@ -141,7 +141,9 @@ std::vector<std::string> FaultyRun::check(const ProgramResult& program, const Ex
 void FaultyRun::checkMessage(const ProgramResult& program, const Expectation& expected,
                              std::vector<std::string>& problems) const {
   if (program.timedOut || program.signal != 0) return;
-  if (program.exitCode != 0 && program.exitCode != 1) problems.push_back(fmt::format("exit code {}", program.exitCode));
+  const bool isWanted =
+      expected.exitCode ? program.exitCode == expected.exitCode : program.exitCode == 0 || program.exitCode == 1;
+  if (!isWanted) problems.push_back(fmt::format("exit code {}", program.exitCode));
   if (program.exitCode == 0 && expected.mayPassSilently && checkOutputs().empty()) return;
   const auto isIn = [&](const std::string& text) {
     const auto named = [&text](const std::string& name) { return text.find(name) != std::string::npos; };

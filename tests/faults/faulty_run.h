@@ -20,6 +20,7 @@ struct Expectation {
   bool logMayLackMessage = false;       ///< the log is what fails, or is not open yet
   bool mayBeToldInReport = false;       ///< what only the report lacks, the report says
   bool mayBeToldBehindLog = false;      ///< it happens when the log is closed, and standard error tells of it
+  std::optional<int> exitCode = {};     ///< none: 0 or 1
   bool resultFileFails = false;         ///< rows that the log tells of may be missing from the result file
 };
 

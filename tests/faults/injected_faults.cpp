@@ -21,76 +21,66 @@ struct Fault {
   std::string text() const { return fmt::format("{}\t{}\t{}\t{}\t{}", call.first, call.second, number, error, how); }
 };
 
-struct ErrorOfCall {
-  const char* call;
-  int error;
-  const char* how;
-};
-
 /// The errors that each call may meet in practice; the first of a call is the one that the short form tries.
-constexpr ErrorOfCall kErrors[] = {{"open-to-write", ENOSPC, "once"},
-                                   {"open-to-write", EACCES, "once"},
-                                   {"open-to-write", EMFILE, "lasting"},
-                                   {"open-to-read", EACCES, "once"},
-                                   {"open-to-read", EIO, "once"},
-                                   {"open-to-read", EMFILE, "lasting"},
-                                   {"write", ENOSPC, "short"},
-                                   {"write", EIO, "lasting"},
-                                   {"read", EIO, "once"},
-                                   {"close", EIO, "once"},
-                                   {"copy", ENOSPC, "lasting"},
-                                   {"fsync", EIO, "once"},
-                                   {"chmod", EPERM, "once"},
-                                   {"rename", EACCES, "once"},
-                                   {"rename", EIO, "once"},
-                                   {"mkdir", ENOSPC, "once"},
-                                   {"mkdir", EACCES, "once"},
-                                   {"unlink", EACCES, "once"},
-                                   {"rmdir", EBUSY, "once"},
-                                   {"symlink", EPERM, "once"},
-                                   {"readlink", EIO, "once"},
-                                   {"access", EACCES, "once"},
-                                   {"stat", EACCES, "once"},
-                                   {"stat", EIO, "lasting"},
-                                   {"set-times", EPERM, "once"},
-                                   {"open-folder", EMFILE, "lasting"},
-                                   {"read-folder", EIO, "once"},
-                                   {"fork", EAGAIN, "once"},
-                                   {"clone", EAGAIN, "once"},
-                                   {"clone", ENOMEM, "lasting"}};
+const std::map<std::string, std::vector<std::pair<int, const char*>>>& errorsOfCalls() {
+  static const std::map<std::string, std::vector<std::pair<int, const char*>>> errors = {
+      {"open-to-write", {{ENOSPC, "once"}, {EACCES, "once"}, {EMFILE, "lasting"}}},
+      {"open-to-read", {{EACCES, "once"}, {EIO, "once"}, {EMFILE, "lasting"}}},
+      {"write", {{ENOSPC, "short"}, {EIO, "lasting"}}},
+      {"read", {{EIO, "once"}}},
+      {"close", {{EIO, "once"}}},
+      {"copy", {{ENOSPC, "lasting"}}},
+      {"fsync", {{EIO, "once"}}},
+      {"chmod", {{EPERM, "once"}}},
+      {"rename", {{EACCES, "once"}, {EIO, "once"}}},
+      {"mkdir", {{ENOSPC, "once"}, {EACCES, "once"}}},
+      {"unlink", {{EACCES, "once"}}},
+      {"rmdir", {{EBUSY, "once"}}},
+      {"symlink", {{EPERM, "once"}}},
+      {"readlink", {{EIO, "once"}}},
+      {"access", {{EACCES, "once"}}},
+      {"stat", {{EACCES, "once"}, {EIO, "lasting"}}},
+      {"set-times", {{EPERM, "once"}}},
+      {"open-folder", {{EMFILE, "lasting"}}},
+      {"read-folder", {{EIO, "once"}}},
+      {"fork", {{EAGAIN, "once"}}},
+      {"clone", {{EAGAIN, "once"}, {ENOMEM, "lasting"}}}};
+  return errors;
+}
+
+/// The kinds of files by what stands in their names; the first that does is it.
+constexpr std::pair<const char*, const char*> kKinds[] = {{"_Restart.dat", "restart settings"},
+                                                          {"_Simulated.bin", "simulated values"},
+                                                          {"basin._spi_", "message file"},
+                                                          {"basin._kill_", "kill file"},
+                                                          {"calSimErr", "failed-run file"},
+                                                          {"basin_Failures", "failure table"},
+                                                          {"basin_Run.", "run record"},
+                                                          {"basin_Saved", "saved output files"},
+                                                          {"basin_Band_", "band file"},
+                                                          {"basin_Sensitivity", "sensitivity file"},
+                                                          {"basin.dat", "result file"},
+                                                          {"basin_Optimisation", "result file"},
+                                                          {"basin_Failed", "kept failed folders"},
+                                                          {"basin_Series.dat", "series file"},
+                                                          {"basin_Report.html", "report"},
+                                                          {"basin_Termination.log", "termination log"},
+                                                          {"(process)", "starting processes"},
+                                                          {"mirevo_batch.log", "batch log"},
+                                                          {"observed.csv", "observed series"},
+                                                          {".tpl", "template"}};
 
 std::string kindOf(const std::string& path) {
-  const auto isIn = [&path](const char* folder) { return path.starts_with(folder); };
   if (path == "basin.kdx") return "setup file";
-  if (path.find("_Restart.dat") != std::string::npos) return "restart settings";
-  if (path.find("_Simulated.bin") != std::string::npos) return "simulated values";
-  if (isIn("basin.") && path.ends_with(".log")) return "run log";
-  if (path == "basin._spi_") return "message file";
-  if (path == "basin._kill_") return "kill file";
-  if (isIn("calSimErr")) return "failed-run file";
-  if (isIn("basin_Failures")) return "failure table";
-  if (isIn("basin_Run.")) return "run record";
-  for (const char* table : {"Covariance", "Correlation", "ParameterLimits", "Jacobian", "Sensitivities", "Quantiles",
-                            "SampleCorrelation"}) {
-    if (isIn(fmt::format("basin_{}.", table).c_str())) return "analysis table";
+  if (path.starts_with("basin.") && path.ends_with(".log")) return "run log";
+  for (const auto& [part, kind] : kKinds) {
+    if (path.find(part) != std::string::npos) return kind;
   }
-  if (isIn("basin_Saved")) return "saved output files";
-  if (isIn("basin_Band_")) return "band file";
-  if (isIn("basin_Sensitivity")) return "sensitivity file";
-  if (isIn("basin.dat") || isIn("basin_Optimisation")) return "result file";
-  if (isIn("basin_Failed")) return "kept failed folders";
-  if (isIn("basin_Series.dat")) return "series file";
-  if (isIn("basin_Report.html")) return "report";
-  if (isIn("basin_Termination.log")) return "termination log";
-  if (path == "(process)") return "starting processes";
-  if (path.ends_with("mirevo_batch.log")) return "batch log";
-  if (isIn("basin_Process") && path.ends_with("parameters.txt")) return "parameter file";
-  if (isIn("basin_Process") && path.ends_with("simulated.csv")) return "simulated series";
-  if (isIn("basin_Process")) return "process folder";
-  if (path == "observed.csv") return "observed series";
-  if (path.ends_with(".tpl")) return "template";
-  if (isIn("model")) return "model folder";
-  return "other files";
+  if (path.starts_with("model")) return "model folder";
+  if (!path.starts_with("basin_Process"))
+    return path.find(".dat") != std::string::npos ? "analysis table" : "other files";
+  if (path.ends_with("parameters.txt")) return "parameter file";
+  return path.ends_with("simulated.csv") ? "simulated series" : "process folder";
 }
 
 /// What may fail unmentioned, and why that is right.
@@ -143,12 +133,12 @@ std::set<int> numbersToFail(int count, bool isLong) {
 std::vector<Fault> faultsOf(const std::map<Call, int>& counts, bool isLong, std::set<std::string>& triedInShort) {
   std::vector<Fault> faults;
   for (const auto& [call, count] : counts) {
-    bool isFirstError = true;
-    for (const ErrorOfCall& error : kErrors) {
-      if (call.first != error.call || (!isLong && !isFirstError)) continue;
-      isFirstError = false;
-      if (!isLong && !triedInShort.insert(call.first + kindOf(call.second)).second) continue;
-      for (const int number : numbersToFail(count, isLong)) faults.push_back({call, number, error.error, error.how});
+    const auto errors = errorsOfCalls().find(call.first);
+    if (errors == errorsOfCalls().end()) continue;
+    if (!isLong && !triedInShort.insert(call.first + kindOf(call.second)).second) continue;
+    for (const auto& [error, how] : errors->second) {
+      for (const int number : numbersToFail(count, isLong)) faults.push_back({call, number, error, how});
+      if (!isLong) break;
     }
   }
   return faults;

@@ -16,18 +16,15 @@
 
 int main(int argc, char** argv) {
   using mirevo::testing::FaultReport;
-  struct Group {
-    std::string_view name;
-    void (*tryAll)(bool isLong, FaultReport& report);
-  };
-  constexpr Group kGroups[] = {{"injected", mirevo::testing::tryInjectedFaults},
-                               {"interruptions", mirevo::testing::tryInterruptions},
-                               {"real", mirevo::testing::tryRealFaults}};
+  constexpr std::pair<std::string_view, void (*)(bool isLong, FaultReport& report)> kGroups[] = {
+      {"injected", mirevo::testing::tryInjectedFaults},
+      {"interruptions", mirevo::testing::tryInterruptions},
+      {"real", mirevo::testing::tryRealFaults}};
   std::set<std::string_view> wanted(argv + 1, argv + argc);
   const bool isLong = wanted.erase("--long") > 0;
   FaultReport report;
-  for (const bool isAll = wanted.empty(); const Group& group : kGroups) {
-    if (isAll || wanted.erase(group.name) > 0) group.tryAll(isLong, report);
+  for (const bool isAll = wanted.empty(); const auto& [name, tryAll] : kGroups) {
+    if (isAll || wanted.erase(name) > 0) tryAll(isLong, report);
   }
   if (wanted.empty()) return report.finish();
   fmt::print(stderr, "Usage: faults [--long] [injected] [interruptions] [real]\n");

@@ -59,6 +59,15 @@ class ModelFolder : public TemporaryFolder {
     EXPECT_TRUE(waitUntil([&] { return exists(name) && read(name).ends_with("\n"); })) << read("basin.log");
     return std::atoi(read(name).c_str());
   }
+  /// Waits until the file holds the text.
+  bool reaches(const std::string& file, const std::string& text) const {
+    return waitUntil([&] { return read(file).find(text) != std::string::npos; });
+  }
+  /// The process of the run, as its message file tells it.
+  int runsProcess() const {
+    const std::string records = read("basin._spi_");
+    return std::atoi(records.c_str() + records.find(", process ") + 10);
+  }
   /// The model's script, with `lines` before the model proper.
   void useScript(const std::string& lines) const {
     write("model/run.sh", fmt::format("#!/bin/sh\n{}\nexec {} \"$@\"\n", lines, MIREVO_TEST_MODEL), 0755);

@@ -69,7 +69,7 @@ TEST(Report, OfARunThatGoesOnOrWasCutOffSaysSoAndLeavesItsFilesAlone) {
   folder.write("basin_Report.html", "of an earlier run");
   {
     RunningProgram run({folder / "basin.kdx"});
-    ASSERT_TRUE(waitUntil([&] { return folder.read("basin.dat").find("\n1\tOK\t") != std::string::npos; }));
+    ASSERT_TRUE(folder.reaches("basin.dat", "\n1\tOK\t"));
     const std::string log = folder.read("basin.log");
     const ProgramResult report = makeReport(folder);
     EXPECT_EQ(report.exitCode, 0) << report.error;

@@ -58,8 +58,7 @@ fi)");
       RunningProgram program = processes == 0 ? RunningProgram({setup_}) : startJob(processes, {setup_});
       const auto rows = processes == 0 ? 12 : 24;
       ASSERT_TRUE(waitUntil([&] { return std::ssize(readDataTable(folder_.read(resultFile_)).rows) == rows; }));
-      const std::string progress = folder_.read("basin._spi_");
-      ::kill(std::atoi(progress.c_str() + progress.find(", process ") + 10), SIGKILL);  // the master
+      ::kill(folder_.runsProcess(), SIGKILL);  // the master
       program.wait();
       std::filesystem::remove_all(folder_ / "tickets");
     }

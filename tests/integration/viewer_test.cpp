@@ -32,15 +32,6 @@ class ViewerTest : public ::testing::Test {
     viewer.type("y");
   }
   std::vector<std::string> attached() const { return {MIREVO_VIEWER, (folder_ / "basin.kdx")}; }
-  bool reaches(const std::string& file, const std::string& text) const {
-    return waitUntil([&] { return folder_.read(file).find(text) != std::string::npos; });
-  }
-  int runsProcess() const {
-    const std::string records = folder_.read("basin._spi_");
-    const std::size_t at = records.find(", process ");
-    return at == std::string::npos ? 0 : std::atoi(records.c_str() + at + 10);
-  }
-
   const ModelFolder folder_;
 };
 
@@ -109,25 +100,21 @@ TEST_F(ViewerTest, StartedWithTheRunItEndsWithTheRunsExitCode) {
 }
 
 TEST_F(ViewerTest, ARunOutlivesItsViewerUntouched) {
-  struct Case {
-    const char* name;
-    std::function<void(TerminalProgram&)> part;
-    bool saysHowToAttach;
-  };
-  for (const Case& example :
-       {Case{"d", [](TerminalProgram& viewer) { viewer.type("d"); }, true},
-        Case{"hang-up", [](TerminalProgram& viewer) { viewer.hangUp(); }, false},
-        Case{"crash", [](TerminalProgram& viewer) { ::kill(viewer.process(), SIGKILL); }, false}}) {
-    SCOPED_TRACE(example.name);
+  const std::pair<const char*, std::function<void(TerminalProgram&)>> parts[] = {
+      {"d", [](TerminalProgram& viewer) { viewer.type("d"); }},
+      {"hang-up", [](TerminalProgram& viewer) { viewer.hangUp(); }},
+      {"crash", [](TerminalProgram& viewer) { ::kill(viewer.process(), SIGKILL); }}};
+  for (const auto& [name, part] : parts) {
+    SCOPED_TRACE(name);
     TerminalProgram viewer({MIREVO_PROGRAM, "//qmon", folder_.writeSetup(slowRun())});
     ASSERT_TRUE(viewer.shows("of 2001"));
-    const int process = runsProcess();
-    example.part(viewer);
-    EXPECT_EQ(viewer.wait(), std::string(example.name) == "crash" ? 128 + SIGKILL : 0);
+    const int process = folder_.runsProcess();
+    part(viewer);
+    EXPECT_EQ(viewer.wait(), name == std::string("crash") ? 128 + SIGKILL : 0);
     const std::size_t size = folder_.read("basin._spi_").size();
     EXPECT_TRUE(waitUntil([&] { return folder_.read("basin._spi_").size() > size + 1000; }));
     EXPECT_TRUE(isRunning(process));
-    if (example.saysHowToAttach) {
+    if (name == std::string("d")) {
       EXPECT_THAT(viewer.output(), HasSubstr(fmt::format("The run goes on as process {}.", process)));
     }
 
@@ -153,7 +140,7 @@ TEST_F(ViewerTest, ControlCAsksUnderTheViewerAndYesCancels) {
 TEST_F(ViewerTest, CancellingARunThatIsOnlyStartingLeavesAnotherRunAlone) {
   const std::string setup = folder_.writeSetup(slowRun());
   RunningProgram other({setup});
-  ASSERT_TRUE(reaches("basin._spi_", "COMSPD"));
+  ASSERT_TRUE(folder_.reaches("basin._spi_", "COMSPD"));
   TerminalProgram viewer({MIREVO_PROGRAM, "//qmon", setup});
   ASSERT_TRUE(viewer.shows("The run is starting."));
   // Its patience must not end while the keys are typed.
@@ -176,7 +163,7 @@ TEST_F(ViewerTest, NoPersonIsWaitedForAtNight) {
 
 TEST_F(ViewerTest, ARunThatWasKilledIsFoundGone) {
   RunningProgram run({folder_.writeSetup(slowRun())});
-  ASSERT_TRUE(reaches("basin._spi_", "COMSPD"));
+  ASSERT_TRUE(folder_.reaches("basin._spi_", "COMSPD"));
   TerminalProgram viewer(attached());
   ASSERT_TRUE(viewer.shows("running"));
   run.send(SIGKILL);
@@ -203,7 +190,7 @@ TEST_F(ViewerTest, WithoutATerminalTheMessagesComeAsLines) {
 
   std::filesystem::remove((folder_ / "basin._spi_"));
   RunningProgram interrupted({"//qmon", folder_.writeSetup(slowRun())});
-  ASSERT_TRUE(reaches("basin._spi_", "COMSPD"));
+  ASSERT_TRUE(folder_.reaches("basin._spi_", "COMSPD"));
   interrupted.send(SIGTERM);
   EXPECT_EQ(interrupted.wait().exitCode, 128 + SIGTERM);
   EXPECT_THAT(folder_.read("basin.log"), HasSubstr("Termination request"));
