@@ -40,7 +40,8 @@ TEST_F(Interruption, ASignalOrAKillFileEndsTheRunWithItsMessageAndNothingIsLeft)
     EXPECT_THAT(folder_.read("basin._spi_"), HasSubstr(fmt::format("\nSTATUSEnded: {}\nPROGRE100.0\n", message)));
     EXPECT_EQ(folder_.read("basin_Termination.log"),
               fmt::format("{}Abnormal completion\n", signal == 0 ? "" : std::string(message) + "\n"));
-    EXPECT_THAT(folder_.read("basin.dat"), ::testing::ContainsRegex(fmt::format("\n1\tOK\t[^\n]*\n(#[^\n]*\n)*# {}\n", message)));
+    EXPECT_THAT(folder_.read("basin.dat"),
+                ::testing::ContainsRegex(fmt::format("\n1\tOK\t[^\n]*\n(#[^\n]*\n)*# {}\n", message)));
     EXPECT_TRUE(waitUntil([&] { return !isRunning(grandchild); }));
     std::filesystem::remove_all(folder_ / "basin_Process1");
   }

@@ -41,10 +41,13 @@ class Restart : public ::testing::Test {
 
 TEST_F(Restart, ARunOfOneKindIsTakenUpByAnother) {
   if (!mpirunIsInstalled()) GTEST_SKIP() << "no mpirun";
-  folder_.useScript(R"(if test -e ../tickets; then
-  n=1; while ! mkdir ../tickets/$n; do n=$((n + 1)); done 2>/dev/null
-  while test $n -gt 12 && test -e ../tickets; do sleep 0.05; done
+  // Each run has tickets of its own, as models of the one that was killed may have a moment left.
+  folder_.useScript(R"(tickets=../tickets$(cat ../round)
+if test -e $tickets; then
+  n=1; while ! mkdir $tickets/$n; do n=$((n + 1)); done 2>/dev/null
+  while test $n -gt 12; do sleep 0.05; done
 fi)");
+  folder_.write("round", "none");
   for (const RunSettings& settings : {RunSettings{.algorithm = 1, .usesSurrogate = true, .maxEvaluations = 60},
                                       RunSettings{.option = 3, .maxEvaluations = 40}}) {
     writeSetup(settings);
@@ -54,14 +57,15 @@ fi)");
     folder_.editSetup("NoSimultaneousSim = 1", "NoSimultaneousSim = 3");
     // Each has made twelve runs of its own when it is killed.
     for (const int processes : {0, 3}) {
-      std::filesystem::create_directory(folder_ / "tickets");
+      folder_.write("round", fmt::format("{}{}", settings.option, processes));
+      std::filesystem::create_directory(folder_ / fmt::format("tickets{}{}", settings.option, processes));
       RunningProgram program = processes == 0 ? RunningProgram({setup_}) : startJob(processes, {setup_});
       const auto rows = processes == 0 ? 12 : 24;
       ASSERT_TRUE(waitUntil([&] { return std::ssize(readDataTable(folder_.read(resultFile_)).rows) == rows; }));
       ::kill(folder_.runsProcess(), SIGKILL);  // the master
       program.wait();
-      std::filesystem::remove_all(folder_ / "tickets");
     }
+    folder_.write("round", "none");
     run();
     EXPECT_EQ(results(), expected) << log();
     EXPECT_THAT(log(), HasSubstr("Restart: 24 evaluations are taken from"));

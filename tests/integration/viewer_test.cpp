@@ -136,17 +136,24 @@ TEST_F(ViewerTest, ControlCAsksUnderTheViewerAndYesCancels) {
   EXPECT_THAT(viewer.output(), HasSubstr("Simulation cancelled"));
 }
 
-/// A run whose lock is held by another one of the setup is starting for some seconds.
+/// A run whose lock is held by another one of the setup is starting for some seconds. It is stopped as soon as it waits
+/// for the lock, so that its patience does not end while the keys are typed.
 TEST_F(ViewerTest, CancellingARunThatIsOnlyStartingLeavesAnotherRunAlone) {
   const std::string setup = folder_.writeSetup(slowRun());
   RunningProgram other({setup});
   ASSERT_TRUE(folder_.reaches("basin._spi_", "COMSPD"));
   TerminalProgram viewer({MIREVO_PROGRAM, "//qmon", setup});
-  ASSERT_TRUE(viewer.shows("The run is starting."));
-  // Its patience must not end while the keys are typed.
-  const int run =
-      std::atoi(TemporaryFolder::readFile(fmt::format("/proc/{0}/task/{0}/children", viewer.process())).c_str());
+  int run = 0;
+  ASSERT_TRUE(waitUntil([&] {
+    run = std::atoi(TemporaryFolder::readFile(fmt::format("/proc/{0}/task/{0}/children", viewer.process())).c_str());
+    std::error_code gone;
+    for (const auto& open : std::filesystem::directory_iterator(fmt::format("/proc/{}/fd", run), gone)) {
+      if (std::filesystem::read_symlink(open, gone) == setup) return true;
+    }
+    return false;
+  }));
   ::kill(run, SIGSTOP);
+  ASSERT_TRUE(viewer.shows("The run is starting."));
   cancelAndConfirm(viewer);
   ::kill(run, SIGCONT);
   EXPECT_EQ(viewer.wait(), 128 + SIGTERM);
