@@ -43,9 +43,7 @@ class TemporaryFolder {
   static std::string readFile(const std::string& path) {
     std::ifstream file(path, std::ios::binary);
     if (!file) return "<no file>";
-    std::ostringstream content;
-    content << file.rdbuf();
-    return content.str();
+    return {std::istreambuf_iterator<char>(file), {}};
   }
 
   bool exists(const std::string& name) const { return std::filesystem::exists(*this / name); }

@@ -1,6 +1,7 @@
 // The rainfall-runoff model of the examples against the published equations and against conservation of mass.
 #include "models/gr4j_cemaneige.h"
 
+#include <array>
 #include <cmath>
 #include <numeric>
 
@@ -18,9 +19,8 @@ TEST(SolidFraction, GoesFromAllToNothingAsTheDayThaws) {
   }
 }
 
-struct ExpectedDay {
-  double precipitation, pet, runoff, evapotranspiration, exchange, production, routing;
-};
+/// Precipitation, evapotranspiration that could be; runoff, evapotranspiration, exchange, both stores.
+using ExpectedDay = std::array<double, 7>;
 
 // Computed apart from this program from the equations as they are published, the unit hydrographs as sums over the
 // past.
@@ -38,14 +38,14 @@ TEST(Gr4j, FollowsThePublishedEquationsDayByDay) {
   };
   for (const auto& [x2, days] : cases) {
     Gr4j model(Parameters{.x1 = 300.0, .x2 = x2, .x3 = 80.0, .x4 = 1.5});
-    for (const ExpectedDay& day : days) {
-      SCOPED_TRACE(testing::Message() << "X2 " << x2 << ", P " << day.precipitation);
-      const Fluxes fluxes = model.advance(day.precipitation, day.pet);
-      EXPECT_NEAR(fluxes.runoff, day.runoff, 1e-11);
-      EXPECT_NEAR(fluxes.evapotranspiration, day.evapotranspiration, 1e-11);
-      EXPECT_NEAR(fluxes.exchange, day.exchange, 1e-11);
-      EXPECT_NEAR(model.production(), day.production, 1e-11);
-      EXPECT_NEAR(model.routing(), day.routing, 1e-11);
+    for (const auto& [precipitation, pet, runoff, evapotranspiration, exchange, production, routing] : days) {
+      SCOPED_TRACE(testing::Message() << "X2 " << x2 << ", P " << precipitation);
+      const Fluxes fluxes = model.advance(precipitation, pet);
+      EXPECT_NEAR(fluxes.runoff, runoff, 1e-11);
+      EXPECT_NEAR(fluxes.evapotranspiration, evapotranspiration, 1e-11);
+      EXPECT_NEAR(fluxes.exchange, exchange, 1e-11);
+      EXPECT_NEAR(model.production(), production, 1e-11);
+      EXPECT_NEAR(model.routing(), routing, 1e-11);
     }
   }
 }

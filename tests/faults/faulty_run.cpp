@@ -130,11 +130,9 @@ std::vector<std::string> FaultyRun::check(const ProgramResult& program, const Ex
   if (program.timedOut) problems.push_back("it does not end");
   if (program.signal != 0 && !program.timedOut) problems.push_back(fmt::format("signal {}", program.signal));
   checkMessage(program, expected, problems);
-  const auto add = [&problems](std::vector<std::string> more) {
+  for (const auto& more : {checkRows(expected), checkEarlierFiles()}) {
     problems.insert(problems.end(), more.begin(), more.end());
-  };
-  add(checkRows(expected));
-  add(checkEarlierFiles());
+  }
   return problems;
 }
 

@@ -79,13 +79,10 @@ TEST_F(Restart, AFinishedRunIsWalkedThroughAndEndsWithTheSameFile) {
   const std::string expected = results();
   folder_.write("model/run.sh", folder_.read("model/run.sh") + "\n");  // the same model, but not the same text
   run(1);
-  EXPECT_THAT(log(), HasSubstr("Error: Unable to continue the earlier run\n"
-                               "the setup is another one than that of the earlier run:\n"
-                               "   BatchFileName of MIREVO_SIMULATION_OPTION/SIMBATCH/SIMBATCHITEM_1: the content of "
-                               "model/run.sh has changed"));
+  EXPECT_THAT(log(),
+              ::testing::ContainsRegex("Error: Unable to continue the earlier run\n.*the content of model/run.sh has"));
   EXPECT_EQ(results(), expected) << "refused without a change";
-  const std::string script = folder_.read("model/run.sh");
-  folder_.write("model/run.sh", script.substr(0, script.size() - 1));
+  folder_.useScript("");
   run();
   EXPECT_EQ(results(), expected);
   EXPECT_THAT(log(), Not(HasSubstr("initiated")));

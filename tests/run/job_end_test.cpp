@@ -51,11 +51,5 @@ TEST(JobEnd, TheMasterLeavesOrAbortsItsJob) {
   }
 }
 
-TEST(JobEnd, AProcessAloneHasNothingToLeave) {
-  RunState state;
-  leaveJob(state, 1, "the end");
-  EXPECT_EQ(state.job->rank(), -1);
-}
-
 }  // namespace
 }  // namespace mirevo

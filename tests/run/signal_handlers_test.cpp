@@ -116,17 +116,15 @@ TEST(SignalHandlers, ARequestWaitsForTheEndOfAStepOfTheMainThread) {
 }
 
 TEST(SignalHandlers, FloatingPointSubCodesHaveTheirOwnMessages) {
-  const std::pair<int, const char*> cases[] = {{FPE_FLTINV, "Floating point exception: Invalid number"},
-                                               {FPE_FLTDIV, "Floating point exception: Zero divide"},
-                                               {FPE_INTDIV, "Floating point exception: Zero divide"},
-                                               {FPE_FLTOVF, "Floating point exception: Overflow"},
-                                               {FPE_FLTRES, "Floating point exception: Inexact precision"},
-                                               {FPE_FLTSUB, "Floating point exception: Non-IEEE type"},
-                                               {SI_USER, "Floating point exception: Non-IEEE type"}};
+  const std::string start = "Floating point exception: ";
+  const std::pair<int, const char*> cases[] = {{FPE_FLTINV, "Invalid number"},    {FPE_FLTDIV, "Zero divide"},
+                                               {FPE_INTDIV, "Zero divide"},       {FPE_FLTOVF, "Overflow"},
+                                               {FPE_FLTRES, "Inexact precision"}, {FPE_FLTSUB, "Non-IEEE type"},
+                                               {SI_USER, "Non-IEEE type"}};
   for (const auto& [signalCode, message] : cases) {
-    EXPECT_EQ(floatingPointMessage(floatingPointSubCode(signalCode)), message) << signalCode;
+    EXPECT_EQ(floatingPointMessage(floatingPointSubCode(signalCode)), start + message) << signalCode;
   }
-  EXPECT_EQ(floatingPointMessage(fpe::kDenormalized), "Floating point exception: Denormalized number");
+  EXPECT_EQ(floatingPointMessage(fpe::kDenormalized), start + "Denormalized number");
 }
 
 #if defined(__x86_64__) && defined(__GLIBC__)

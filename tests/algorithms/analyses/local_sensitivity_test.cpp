@@ -15,19 +15,18 @@ namespace {
 
 using testing::FunctionEvaluator;
 
-struct Parameter {
-  TransformationType type;
-  double initial, lower, upper;  // search scale; an integer parameter's upper one above its largest value
-};
+/// Transformation, initial value and bounds on the search scale; an integer parameter's upper one above its largest
+/// value.
+using Parameter = std::tuple<TransformationType, double, double, double>;
 
 SearchSpace spaceOf(const std::vector<Parameter>& parameters) {
   SearchSpace space;
-  for (const Parameter& p : parameters) {
+  for (const auto& [type, initial, lower, upper] : parameters) {
     space.names.push_back(fmt::format("p{}", space.names.size() + 1));
-    space.initial.push_back(p.initial);
-    space.lower.push_back(p.lower);
-    space.upper.push_back(p.upper);
-    space.transformation.push_back(p.type);
+    space.initial.push_back(initial);
+    space.lower.push_back(lower);
+    space.upper.push_back(upper);
+    space.transformation.push_back(type);
   }
   return space;
 }

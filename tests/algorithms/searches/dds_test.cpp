@@ -18,8 +18,6 @@ namespace {
 using testing::FunctionEvaluator;
 using testing::resultOf;
 
-constexpr const char* kBudgetUsed = "Optimisation terminated: Maximum number of model evaluations reached";
-
 /// The given deviates in order; running past their end fails the test.
 DeviateSource scripted(std::vector<double> deviates) {
   return [deviates = std::move(deviates), next = std::size_t{0}]() mutable {
@@ -88,7 +86,7 @@ TEST(Dds, EvaluatesStartPointsInOneBatchThenOneByOne) {
     }
     EXPECT_EQ(dds.summary().evaluationCount, 12);
     EXPECT_EQ(dds.summary().loopCount, static_cast<int>(12 - starts));
-    EXPECT_EQ(dds.summary().terminationMessage, kBudgetUsed);
+    EXPECT_EQ(dds.summary().terminationMessage, "Optimisation terminated: Maximum number of model evaluations reached");
     EXPECT_EQ(dds.advance(), kSearchOk);
     EXPECT_EQ(evaluator.evaluationCount, 12);
   }

@@ -14,12 +14,8 @@ constexpr std::string_view kBudget = "Optimisation terminated: Maximum number of
 constexpr std::string_view kObjective = "Optimisation terminated: Objective function convergence criterion met";
 constexpr std::string_view kPopulation = "Optimisation terminated: Population converged";
 
-struct Loop {
-  double best;
-  int evaluations;
-  double range;
-  std::string_view message;
-};
+/// The best value, the evaluations so far, the population's range and the message.
+using Loop = std::tuple<double, int, double, std::string_view>;
 
 TEST(StoppingTests, StopWithTheMessageOfTheLastTestThatHolds) {
   const std::vector<std::tuple<std::string, StoppingCriteria, std::vector<Loop>>> cases{
@@ -42,9 +38,9 @@ TEST(StoppingTests, StopWithTheMessageOfTheLastTestThatHolds) {
   for (const auto& [name, criteria, loops] : cases) {
     StoppingTests tests(criteria);
     EXPECT_EQ(tests.relativeChange(), 2.0 * criteria.minChange) << name;
-    for (const Loop& loop : loops) {
-      tests.update(loop.best, loop.evaluations, loop.range);
-      EXPECT_EQ(tests.message(), loop.message) << name << ", evaluation " << loop.evaluations;
+    for (const auto& [best, evaluations, range, message] : loops) {
+      tests.update(best, evaluations, range);
+      EXPECT_EQ(tests.message(), message) << name << ", evaluation " << evaluations;
     }
   }
 }

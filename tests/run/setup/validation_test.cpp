@@ -175,11 +175,7 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
 }
 
 /// A keyword row and the setup in which its section is read.
-struct RowInSetup {
-  const SectionRow* section;
-  const KeywordRow* row;
-  std::string text;  ///< the setup
-};
+using RowInSetup = std::tuple<const SectionRow*, const KeywordRow*, std::string>;
 
 /// Every keyword of every section that some setup reads.
 std::vector<RowInSetup> rowsInSetups(const std::string& setup) {
@@ -208,16 +204,16 @@ std::vector<RowInSetup> rowsInSetups(const std::string& setup) {
 
 TEST_F(ValidationTest, RefusesNumbersOutsideTheRangeOfTheirRow) {
   int checked = 0;
-  for (const RowInSetup& tried : rowsInSetups(edited(""))) {
-    const KeywordFacts& facts = tried.row->facts;
+  for (const auto& [section, row, text] : rowsInSetups(edited(""))) {
+    const KeywordFacts& facts = row->facts;
     if (facts.refusal.empty()) continue;
-    const bool isReal = tried.row->type == KeywordType::real;
+    const bool isReal = row->type == KeywordType::real;
     const double below = facts.range.lowestExcluded ? facts.range.lowest : facts.range.lowest - (isReal ? 1e-9 : 1);
     for (const double value : {below, facts.range.highest + (isReal ? 1e-6 : 1)}) {
       if (!std::isfinite(value)) continue;
-      SCOPED_TRACE(fmt::format("{} {} = {}", tried.section->path, facts.name, value));
+      SCOPED_TRACE(fmt::format("{} {} = {}", section->path, facts.name, value));
       const std::string number = isReal ? fmt::format("{:.12g}", value) : fmt::format("{:.0f}", value);
-      const std::string error = failureOf(withValue(tried.text, tried.section->path, facts.name, number));
+      const std::string error = failureOf(withValue(text, section->path, facts.name, number));
       EXPECT_THAT(error, StartsWith(std::string(facts.refusal)));
       EXPECT_THAT(error, HasSubstr(fmt::format("{}: expected {}, found ", facts.name, facts.range.text())));
       EXPECT_THAT(error, HasSubstr("\nsetup.kdx:")) << "every refusal names its location";
@@ -230,29 +226,26 @@ TEST_F(ValidationTest, RefusesNumbersOutsideTheRangeOfTheirRow) {
 TEST_F(ValidationTest, CodesAreTakenByNumberOrByName) {
   const auto firstLine = [](const std::string& text) { return text.substr(0, text.find('\n')); };
   int compared = 0;
-  for (const RowInSetup& tried : rowsInSetups(edited(""))) {
-    if (tried.row->type != KeywordType::code) continue;
-    SCOPED_TRACE(std::string(tried.section->path) + " " + std::string(tried.row->name()));
-    const auto setTo = [&](const std::string& value) {
-      return withValue(tried.text, tried.section->path, tried.row->name(), value);
-    };
-    for (const CodeName& code : tried.row->facts.codes) {
+  for (const auto& [section, row, text] : rowsInSetups(edited(""))) {
+    if (row->type != KeywordType::code) continue;
+    SCOPED_TRACE(std::string(section->path) + " " + std::string(row->name()));
+    for (const CodeName& code : row->facts.codes) {
       std::string shouted(code.name);
       for (char& c : shouted) c = static_cast<char>(std::toupper(static_cast<unsigned char>(c)));
-      const std::string byName = setTo("' " + shouted + " '");
+      const std::string byName = withValue(text, section->path, row->name(), "' " + shouted + " '");
       if (!code.code) {
         EXPECT_EQ(failureOf(byName), "");
         continue;
       }
-      const std::string byNumber = setTo(std::to_string(*code.code));
+      const std::string byNumber = withValue(text, section->path, row->name(), std::to_string(*code.code));
       EXPECT_EQ(firstLine(failureOf(byName)), firstLine(failureOf(byNumber)));
       EXPECT_EQ(logOfText(byName), logOfText(byNumber));
       ++compared;
     }
-    const std::string error = failureOf(setTo("'nonesuch'"));
+    const std::string error = failureOf(withValue(text, section->path, row->name(), "'nonesuch'"));
     EXPECT_THAT(error, StartsWith("Error: Unable to read keyword in section "));
     EXPECT_THAT(error, HasSubstr(fmt::format("{}: expected an integer within 32 bits or one of the names '{}'",
-                                             tried.row->name(), tried.row->facts.codes.front().name)));
+                                             row->name(), row->facts.codes.front().name)));
   }
   EXPECT_GT(compared, 40);
   EXPECT_THAT(failure("Option = 2 => 'optimsation'"),
