@@ -12,7 +12,6 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "refusal.h"
 #include "temporary_folder.h"
 
 namespace mirevo {
@@ -124,18 +123,6 @@ TEST(ProcessFolder, KnowsItsOwnBehindALink) {
   makeProcessFolder(folder / "base", folder / "link/cal_Process1", folder / "link/cal_Process");
   EXPECT_TRUE(folder.exists("link/cal_Process1/scratch"));
   EXPECT_TRUE(fs::is_empty(folder / "link/cal_Process1/scratch"));
-}
-
-TEST(ProcessFolder, NamesThePathThatCannotBeCopied) {
-  const TemporaryFolder folder;
-  folder.write("base/run.sh", "");
-  const std::tuple<const char*, const char*, std::string> cases[] = {
-      {"base", "no/such/run_Process", "create the folder " + folder / "no/such/run_Process1"},
-      {"missing", "run_Process", "read the folder " + folder / "missing"}};
-  for (const auto& [source, target, refusal] : cases) {
-    EXPECT_EQ(refusalOf([&] { makeProcessFolder(folder / source, folder / target + "1", folder / target); }),
-              "Unable to " + refusal + ": No such file or directory");
-  }
 }
 
 }  // namespace
