@@ -16,8 +16,9 @@ bool takeRow(std::string_view line, std::size_t columnCount, const ResultColumns
     return isWhole;
   }
   auto row = readResultRow(line, columns);
-  if (row) table.rows.push_back(*std::move(row));
-  return row.has_value();
+  if (!row) return false;
+  table.rows.push_back(std::move(*row));
+  return true;
 }
 
 }  // namespace
