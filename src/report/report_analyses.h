@@ -27,7 +27,7 @@ std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, 
                                                        const SearchSpace& space, std::span<const ResultRow> rows);
 
 /// The covariance of the parameters that a finished sensitivity analysis has written beside its results; nothing where
-/// there is none.
-std::optional<ReportedCovariance> reportedCovariance(const std::string& filePrefix);
+/// there is none, or where its files cannot be read, with the `fault` in them.
+std::optional<ReportedCovariance> reportedCovariance(const std::string& filePrefix, std::string& fault);
 
 }  // namespace mirevo

@@ -15,8 +15,9 @@ namespace mirevo {
 
 /// What a run's files say of it.
 struct RunSources {
-  ResultTable results;  ///< rows in the order of their numbers
+  ResultTable results;  ///< rows in the order of their numbers, each number once
   RunRecord record;
+  std::string recordFault;  ///< why there is no record to be read; empty where there is one, or none was written
   RunStage stage = RunStage::running;
   std::string ended;  ///< empty while the run goes on
 };
@@ -30,12 +31,11 @@ struct OptionalSource {
 };
 
 /// Reads results and record of the setup's run; the run's lock says whether it is going on. `filePrefix`: folder and
-/// name of the setup. Nothing, with the reason, where there are no results. Throws FatalError where there is a record
-/// that cannot be read.
+/// name of the setup. Nothing, with the reason, where there are no results.
 std::optional<RunSources> readRunSources(const RunConfig& config, const SearchSpace& space,
                                          const std::string& filePrefix, std::string& reason);
 
-OptionalSource<std::vector<FailureRow>> readFailures(const std::string& filePrefix);
+OptionalSource<std::vector<FailureRow>> readFailures(const std::string& filePrefix, const ResultFileNames& names);
 OptionalSource<SeriesTable> readSeries(const std::string& filePrefix);
 
 }  // namespace mirevo

@@ -338,8 +338,12 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
     state_.log.line(text);
     showMessage(text);
   }
-  closeResults({RunStage::failed, std::string(message), text});  // it has failed already, with the first reason
-  if (launcher_) launcher_->haltProcesses();                     // no model waits for the report
+  try {
+    closeResults({RunStage::failed, std::string(message), text});  // it has failed already, with the first reason
+  } catch (const std::exception& error) {
+    state_.log.warning(std::string("The results may lack their end: ") + error.what());
+  }
+  if (launcher_) launcher_->haltProcesses();  // no model waits for the report
   reportRun();
   return endEarly(message);
 }

@@ -12,11 +12,13 @@
 
 namespace mirevo {
 
-/// The files of a run by which it can be taken up again when it is cut off.
+/// The files of a run by which it can be continued when it is cut off.
 struct RestartFiles {
   std::string results;
   std::string settings;         ///< what they depend on
   std::string simulatedValues;  ///< where the task works with them
+  std::string record;
+  std::string failures;
 };
 
 /// Their paths; `filePrefix` is folder and name of the setup.
@@ -39,7 +41,7 @@ struct EarlierRun {
 std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunConfig& config,
                                          const ResultColumns& columns, std::optional<RunRecord> record);
 
-/// Its evaluations by number. `failures`: why the failed ones did. `simulatedValues`: those of the others, where the
+/// Its evaluations by number. `failures`: why those failed that did. `simulatedValues`: those of the others, where the
 /// task works with them; rows without them are left out, and so made again.
 std::map<int, EarlierEvaluations::Record> earlierRecords(
     EarlierRun& run, const std::map<int, EvaluationFailure>& failures,

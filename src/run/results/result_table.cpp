@@ -1,5 +1,6 @@
 #include "run/results/result_table.h"
 
+#include <algorithm>
 #include <utility>
 
 #include "common/data_table.h"
@@ -49,6 +50,12 @@ ResultTable readResultTable(std::string_view text, const ResultColumns& columns)
     }
   }
   return table;
+}
+
+void putInOrder(std::vector<ResultRow>& rows) {
+  std::stable_sort(rows.begin(), rows.end(), [](const auto& a, const auto& b) { return a.number < b.number; });
+  rows.erase(std::unique(rows.begin(), rows.end(), [](const auto& a, const auto& b) { return a.number == b.number; }),
+             rows.end());
 }
 
 }  // namespace mirevo

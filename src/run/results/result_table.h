@@ -26,4 +26,7 @@ struct ResultTable {
 /// as unusable.
 ResultTable readResultTable(std::string_view text, const ResultColumns& columns);
 
+/// Brings the rows into the order of their numbers; of several with one number the first is kept.
+void putInOrder(std::vector<ResultRow>& rows);
+
 }  // namespace mirevo

@@ -106,7 +106,7 @@ void OptimisationTask::read(const TaskReading& reading) {
   if (surrogateUse == SurrogateUse::yes) readSurrogate(reading, section, stops);
 }
 
-void OptimisationTask::readMethod(const TaskReading& reading, const SetupSection& section) {
+void OptimisationTask::readMethod(const TaskReading& reading, const SetupSection& section) const {
   if (method->facts().drawsInitialSample) refuseEmptyRanges(reading);
   const BoundSection bound = method->section();
   const SetupSection control = section.open(nameInside(*bound.row));

@@ -37,7 +37,7 @@ class OptimisationTask final : public Task {
  private:
   /// Whether a surrogate model assists the search.
   bool usesSurrogate() const { return surrogateUse == SurrogateUse::yes && method && method->facts().usesSurrogate; }
-  void readMethod(const TaskReading& reading, const SetupSection& section);
+  void readMethod(const TaskReading& reading, const SetupSection& section) const;
   void readStopping(const SetupSection& section);
   void readSurrogate(const TaskReading& reading, const SetupSection& section, const SetupSection& stoppingSection);
   SearchSummary search(const TaskContext& context) const;
