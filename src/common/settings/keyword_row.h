@@ -83,7 +83,7 @@ struct KeywordFacts {
   /// Fixed text for a value outside the range; a blank at its end stands before the name of the item.
   std::string_view refusal = {};
   std::string_view unit = {};
-  std::string_view meaning = {};
+  std::string meaning = {};
   bool bearsOnResults = true;  ///< another value may give other results: no run is continued with it
   int checkOrder = 0;          ///< values are checked in this order, those of the same order as they are read
 };
@@ -168,7 +168,7 @@ KeywordRow setting(FieldOf, KeywordFacts facts) {
   const KeywordType type = facts.type.value_or(
       std::is_same_v<Field, bool> || !facts.codes.empty() ? KeywordType::code : settings_detail::typeOf<Field>());
   if (std::is_same_v<Field, bool> && facts.codes.empty()) facts.codes = kNoYesNames;
-  return {facts, type, [](void* settings, const SetupValue& value) {
+  return {std::move(facts), type, [](void* settings, const SetupValue& value) {
             settings_detail::assign(FieldOf{}(*static_cast<Settings*>(settings)), value);
           }};
 }
@@ -177,17 +177,17 @@ KeywordRow setting(FieldOf, KeywordFacts facts) {
 template <auto Member, class Settings, class Field>
 KeywordRow memberSetting(Field Settings::*, KeywordFacts facts) {
   return setting<Settings>(
-      [](Settings & settings) -> auto& { return settings.*Member; }, facts);
+      [](Settings & settings) -> auto& { return settings.*Member; }, std::move(facts));
 }
 template <auto Member>
 KeywordRow setting(KeywordFacts facts) {
-  return memberSetting<Member>(Member, facts);
+  return memberSetting<Member>(Member, std::move(facts));
 }
 
 /// A coded row whose value is handed on as it was read, a number or a name: `take(settings, value)`.
 template <class Settings, class Take>
 KeywordRow choice(Take, KeywordFacts facts) {
-  return {facts, KeywordType::code,
+  return {std::move(facts), KeywordType::code,
           [](void* settings, const SetupValue& value) { Take{}(*static_cast<Settings*>(settings), value); }};
 }
 

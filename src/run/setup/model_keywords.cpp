@@ -29,7 +29,7 @@ SettingSection<SeriesReference> seriesSection(std::string_view path, std::string
            "for each measure of interface type 0",
            meaning,
            {setting<&SeriesReference::fileName>(
-                {.name = "File_Name", .type = KeywordType::fileName, .meaning = fileMeaning}),
+                {.name = "File_Name", .type = KeywordType::fileName, .meaning = std::string(fileMeaning)}),
             setting<&SeriesReference::itemNo>(
                 {.name = "Item_No", .defaultValue = "1", .meaning = "Which item of the file, from 1."})}}};
 }

@@ -1,5 +1,7 @@
 #include "run/setup/run_keywords.h"
 
+#include <fmt/format.h>
+
 #include "run/setup/model_keywords.h"
 #include "run/setup/validation.h"
 #include "run/tasks/tasks.h"
@@ -31,11 +33,11 @@ const SettingSection<RunConfig>& simulationOptionSection() {
       {"MIREVO_SIMULATION_OPTION",
        "always",
        "The task of the run and the model that it runs.",
-       {choice<RunConfig>([](RunConfig& config, const SetupValue& value) { config.task = makeTask(value); },
+       {choice<RunConfig>([](RunConfig& config, const SetupValue& value) { config.task = tasks().make(value); },
                           {.name = "Option",
-                           .codes = taskNames(),
-                           .meaning = "The task: 0 scenario runs, 1 sensitivity analysis, 2 parameter optimisation, 3 "
-                                      "uncertainty analysis. Any other number runs nothing and ends normally."}),
+                           .codes = tasks().names(),
+                           .meaning = fmt::format("The task: {}. Any other number runs nothing and ends normally.",
+                                                  tasks().meanings())}),
         setting<&RunConfig::title>({.name = "Title",
                                     .defaultValue = "''",
                                     .meaning = "Title of the run, in the log and the result files.",
@@ -128,7 +130,7 @@ const SetupSchema& setupSchema() {
                                         &objectiveSection().row,
                                         &listSection("SAVE_OUTPUT_FILES"),
                                         &savedFileSection().row};
-    for (const auto& task : allTasks()) {
+    for (const auto& task : tasks().all()) {
       const auto sections = task->sections();
       rows.insert(rows.end(), sections.begin(), sections.end());
     }

@@ -20,13 +20,12 @@ const SettingSection<OptimisationTask>& optimisationSection() {
        "when `Option` is 2",
        "Parameter optimisation.",
        {choice<OptimisationTask>(
-            [](OptimisationTask& task, const SetupValue& value) { task.method = makeSearchMethod(value); },
+            [](OptimisationTask& task, const SetupValue& value) { task.method = searchMethods().make(value); },
             {.name = "Algorithm_Type",
              .range = between(0, 2),
-             .codes = searchNames(),
+             .codes = searchMethods().names(),
              .refusal = "Error: Invalid optimisation algorithm type selection",
-             .meaning = "0 Shuffled Complex Evolution, 1 Population Simplex Evolution, 2 Dynamically Dimensioned "
-                        "Search."}),
+             .meaning = searchMethods().meanings() + "."}),
         setting<&OptimisationTask::surrogateUse>(
             {.name = kSurrogateKeyword,
              .defaultValue = "0",
@@ -74,13 +73,13 @@ void logBestSet(const TaskContext& context, const ParameterSet& best, const Eval
 }  // namespace
 
 const TaskFacts& OptimisationTask::facts() const {
-  static constexpr TaskFacts kFacts{{2, "optimisation"}, run_files::kOptimisation};
+  static constexpr TaskFacts kFacts{{2, "optimisation"}, "parameter optimisation", run_files::kOptimisation};
   return kFacts;
 }
 
 std::vector<const SectionRow*> OptimisationTask::sections() const {
   std::vector<const SectionRow*> rows{&optimisationSection().row};
-  for (const auto& search : searchMethods()) rows.push_back(search->section().row);
+  for (const auto& search : searchMethods().all()) rows.push_back(search->section().row);
   rows.insert(rows.end(), {&initialSampleSection().row, &stoppingSection().row, &surrogateSection().row});
   return rows;
 }

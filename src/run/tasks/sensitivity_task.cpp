@@ -123,7 +123,7 @@ void addCovariance(const TaskContext& context, const LocalSensitivity& sensitivi
 }  // namespace
 
 const TaskFacts& SensitivityTask::facts() const {
-  static constexpr TaskFacts kFacts{{1, "sensitivity"}, run_files::kSensitivity};
+  static constexpr TaskFacts kFacts{{1, "sensitivity"}, "sensitivity analysis", run_files::kSensitivity};
   return kFacts;
 }
 

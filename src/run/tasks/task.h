@@ -27,7 +27,8 @@ struct SensitivitySettings;
 
 /// What is always true of a task, whatever its settings.
 struct TaskFacts {
-  CodeName name;  ///< in setups; the name also tells reports which task it is: "optimisation"
+  CodeName name;              ///< in setups; the name also tells reports which task it is: "optimisation"
+  std::string_view longName;  ///< "parameter optimisation"
   ResultFileNames resultFiles;
 };
 
