@@ -174,7 +174,8 @@ const SearchFacts& PseMethod::facts() const {
                                       .longName = "Population Simplex Evolution",
                                       .runsInParallel = true,
                                       .usesSurrogate = true,
-                                      .drawsInitialSample = true};
+                                      .drawsInitialSample = true,
+                                      .needsRanges = true};
   return kFacts;
 }
 

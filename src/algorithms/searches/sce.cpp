@@ -142,8 +142,11 @@ ParameterSet Sce::mutation(const Complex& complex) {
 }
 
 const SearchFacts& SceMethod::facts() const {
-  static constexpr SearchFacts kFacts{
-      .name = {0, "SCE"}, .longName = "Shuffled Complex Evolution", .usesSurrogate = true, .drawsInitialSample = true};
+  static constexpr SearchFacts kFacts{.name = {0, "SCE"},
+                                      .longName = "Shuffled Complex Evolution",
+                                      .usesSurrogate = true,
+                                      .drawsInitialSample = true,
+                                      .needsRanges = true};
   return kFacts;
 }
 

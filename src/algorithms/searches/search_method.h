@@ -29,6 +29,7 @@ struct SearchFacts {
   bool runsInParallel = false;      ///< its batches fill several slots
   bool usesSurrogate = false;       ///< a surrogate model can choose among its proposals
   bool drawsInitialSample = false;  ///< it begins with the sample that the section INITIAL_SAMPLE describes
+  bool needsRanges = false;         ///< it measures by each parameter's range, which must not be empty
 };
 
 /// A keyword whose value is small for the number of variable parameters: the search may end early.

@@ -51,7 +51,7 @@ const SettingSection<SurrogateSettings>& surrogateSection() {
   static const SettingSection<SurrogateSettings> section{
       {"OPTIMISATION_ALGORITHM/SURROGATE_MODEL_PARAMETERS",
        "when `Use_Surrogate_Model` is 1",
-       "The surrogate model that SCE and PSE may use to save model runs. May be empty.",
+       "The surrogate model with which a search may save model runs. May be empty.",
        {setting<&Settings::samplingRate>(
             {.name = "Sampling_rate",
              .defaultValue = "25",

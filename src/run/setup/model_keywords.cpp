@@ -4,6 +4,7 @@
 
 #include <fmt/format.h>
 
+#include "algorithms/searches/search_methods.h"
 #include "measures/statistics.h"
 #include "run/setup/validation.h"
 
@@ -127,8 +128,9 @@ const SettingSection<ModelParameter>& parameterSection() {
              .meaning = "Lowest value. Greater than 0 for a logarithmic variable parameter."}),
         setting<&Parameter::upperBound>({.name = "Upper_Bound",
                                          .unit = "of the parameter",
-                                         .meaning = "Highest value, not below the lowest; above it for a variable "
-                                                    "parameter that SCE or PSE searches."}),
+                                         .meaning = fmt::format("Highest value, not below the lowest; above it for a "
+                                                                "variable parameter that {} searches.",
+                                                                searchesWith(&SearchFacts::needsRanges, " or "))}),
         setting<&Parameter::transformationType>(
             {.name = "Transformation_Type",
              .defaultValue = "0",

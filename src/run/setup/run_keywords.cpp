@@ -2,6 +2,7 @@
 
 #include <fmt/format.h>
 
+#include "algorithms/searches/search_methods.h"
 #include "run/setup/model_keywords.h"
 #include "run/setup/validation.h"
 #include "run/tasks/tasks.h"
@@ -82,9 +83,10 @@ const SettingSection<RunConfig>& slotsSection() {
                  .range = from(1),
                  .refusal = "Error: Invalid No. of processes",
                  .unit = "model runs",
-                 .meaning = "Model runs at once, each in a process folder of its own; no more than the run "
-                            "has evaluations. In an optimisation more than 1 needs PSE. In an MPI job: 1 "
-                            "on each worker.",
+                 .meaning = fmt::format(
+                     "Model runs at once, each in a process folder of its own; no more than the run has evaluations. "
+                     "In an optimisation more than 1 needs {}. In an MPI job: 1 on each worker.",
+                     searchesWith(&SearchFacts::runsInParallel, " or ")),
                  .bearsOnResults = kNotOfResults}),
             [](const RunConfig& config) { return validateProcessCount(config); }),
         setting<&RunConfig::useSingleThread>({.name = "UseSingleThread",

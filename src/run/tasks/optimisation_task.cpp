@@ -12,6 +12,7 @@
 namespace mirevo {
 namespace {
 
+constexpr std::string_view kAlgorithmKeyword = "Algorithm_Type";
 constexpr std::string_view kSurrogateKeyword = "Use_Surrogate_Model";
 
 const SettingSection<OptimisationTask>& optimisationSection() {
@@ -21,7 +22,7 @@ const SettingSection<OptimisationTask>& optimisationSection() {
        "Parameter optimisation.",
        {choice<OptimisationTask>(
             [](OptimisationTask& task, const SetupValue& value) { task.method = searchMethods().make(value); },
-            {.name = "Algorithm_Type",
+            {.name = kAlgorithmKeyword,
              .range = between(0, 2),
              .codes = searchMethods().names(),
              .refusal = "Error: Invalid optimisation algorithm type selection",
@@ -30,11 +31,12 @@ const SettingSection<OptimisationTask>& optimisationSection() {
             {.name = kSurrogateKeyword,
              .defaultValue = "0",
              .codes = kNoYesNames,
-             .meaning = "0 no, 1 yes; for SCE and PSE. Any other number runs no search."})}}};
+             .meaning = fmt::format("0 no, 1 yes; for {}. Any other number runs no search.",
+                                    searchesWith(&SearchFacts::usesSurrogate, " and "))})}}};
   return section;
 }
 
-/// Searches with a population measure it by each parameter's range. An integer parameter always has one.
+/// An integer parameter always has a range.
 void refuseEmptyRanges(const TaskReading& reading) {
   for (std::size_t i = 0; i < reading.parameters.size(); ++i) {
     const ModelParameter& parameter = reading.parameters[i];
@@ -44,8 +46,8 @@ void refuseEmptyRanges(const TaskReading& reading) {
     }
     reading.parameterSections[i].refuse(
         "Error: Lower bound equal to upper bound for parameter " + parameter.name, "Upper_Bound",
-        fmt::format("expected more than {} for a search by SCE or PSE; Parameter_Type = 1 fixes a parameter",
-                    parameter.lowerBound));
+        fmt::format("expected more than {} for a search by {}; Parameter_Type = 1 fixes a parameter",
+                    parameter.lowerBound, searchesWith(&SearchFacts::needsRanges, " or ")));
   }
 }
 
@@ -106,7 +108,7 @@ void OptimisationTask::read(const TaskReading& reading) {
 }
 
 void OptimisationTask::readMethod(const TaskReading& reading, const SetupSection& section) {
-  if (method->facts().drawsInitialSample) refuseEmptyRanges(reading);
+  if (method->facts().needsRanges) refuseEmptyRanges(reading);
   const BoundSection bound = method->section();
   const SetupSection control = section.open(nameInside(*bound.row));
   control.read(bound);
@@ -167,6 +169,12 @@ std::vector<std::string> OptimisationTask::summaryLines(std::size_t variableCoun
       "Surrogate model: {} fitted to the {} nearest sets, chooses one of {} proposals; loops without it: {}",
       surrogateModelName(surrogate), neighbourhoodSize(surrogate, variableCount), proposalsPerRun(surrogate),
       surrogate.initialGenerations)};
+}
+
+std::optional<OneSlotOnly> OptimisationTask::needsOneSlot() const {
+  if (method->facts().runsInParallel) return std::nullopt;
+  return OneSlotOnly{"Error: Use Population Simplex Evolution algorithm for application with multiple processors",
+                     kAlgorithmKeyword};
 }
 
 SearchSummary OptimisationTask::search(const TaskContext& context) const {

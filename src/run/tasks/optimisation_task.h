@@ -23,7 +23,7 @@ class OptimisationTask final : public Task {
   int plannedEvaluations(std::size_t /*variableCount*/) const override { return stopping.maxEvaluations; }
   bool hasFinalRun() const override { return true; }
   bool drawsRandomNumbers() const override { return true; }
-  bool runsInParallel() const override { return method && method->facts().runsInParallel; }
+  std::optional<OneSlotOnly> needsOneSlot() const override;
   TaskOutcome run(const TaskContext& context) override;
   TaskReport report() const override;
   std::optional<RaisedBudget> raisedBudget(const SearchHistory& history) const override;

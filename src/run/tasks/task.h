@@ -3,6 +3,7 @@
 #include <cstdint>
 #include <functional>
 #include <memory>
+#include <optional>
 #include <span>
 #include <string>
 #include <string_view>
@@ -80,6 +81,12 @@ struct TaskReport {
   const SensitivitySettings* sensitivity = nullptr;  ///< of a local sensitivity analysis
 };
 
+/// Why more slots than one are refused.
+struct OneSlotOnly {
+  std::string_view refusal;  ///< the fixed text
+  std::string_view keyword;  ///< whose value it is that needs one slot
+};
+
 /// A task together with its settings: everything that a setup, a run, a restart or a report asks about it. One form per
 /// task, in a file pair of its own; tasks.h lists them.
 class Task {
@@ -110,8 +117,8 @@ class Task {
   virtual bool drawsRandomNumbers() const { return false; }
   /// Whether it works with simulated values at the observation times, which the results then have to hold.
   virtual bool keepsSimulatedValues() const { return false; }
-  /// Whether its batches fill several slots; where they do not, more than one is refused.
-  virtual bool runsInParallel() const { return true; }
+  /// Nothing where its batches fill several slots.
+  virtual std::optional<OneSlotOnly> needsOneSlot() const { return std::nullopt; }
 
   /// Runs it. Throws FatalError and RunCancelled.
   virtual TaskOutcome run(const TaskContext& context) = 0;
