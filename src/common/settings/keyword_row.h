@@ -63,6 +63,9 @@ constexpr ValueRange between(double lowest, double highest) {
 /// Default of an optional keyword without a value of its own.
 inline constexpr std::string_view kNoDefault = "none";
 
+/// KeywordFacts::bearsOnResults of settings that bear on no result.
+inline constexpr bool kNotOfResults = false;
+
 /// Names of settings that are a yes or a no.
 inline constexpr CodeName kNoYesNames[] = {{0, "no"}, {1, "yes"}};
 
@@ -199,6 +202,12 @@ KeywordRow checked(KeywordRow row, Check) {
     return Check{}(*static_cast<const Settings*>(settings));
   };
   return row;
+}
+
+/// SectionRow::itemName by `nameOf(settings)`, a lambda without captures.
+template <class Settings, class NameOf>
+auto itemName(NameOf) {
+  return [](const void* settings) -> std::string { return NameOf{}(*static_cast<const Settings*>(settings)); };
 }
 
 /// The row of a list's count.

@@ -11,19 +11,6 @@
 namespace mirevo {
 namespace {
 
-/// Rows of these settings bear on no result.
-constexpr bool kNotOfResults = false;
-
-std::string nameOfMeasure(const void* measure) {
-  return static_cast<const OutputMeasure*>(measure)->name;
-}
-std::string nameOfObjective(const void* objective) {
-  return static_cast<const ObjectiveFunction*>(objective)->name;
-}
-std::string nameOfParameter(const void* parameter) {
-  return static_cast<const ModelParameter*>(parameter)->name;
-}
-
 SettingSection<SeriesReference> seriesSection(std::string_view path, std::string_view meaning,
                                               std::string_view fileMeaning) {
   return {{path,
@@ -162,7 +149,7 @@ const SettingSection<ModelParameter>& parameterSection() {
                                       .defaultValue = "''",
                                       .meaning = "Free text.",
                                       .bearsOnResults = kNotOfResults})},
-       nameOfParameter}};
+       itemName<Parameter>([](const Parameter& parameter) { return parameter.name; })}};
   return section;
 }
 
@@ -262,7 +249,7 @@ const SettingSection<OutputMeasure>& measureSection() {
                                          .defaultValue = "''",
                                          .meaning = "The objective function that the measure belongs to; if blank, the "
                                                     "measure is only reported."})},
-       nameOfMeasure}};
+       itemName<Measure>([](const Measure& measure) { return measure.name; })}};
   return section;
 }
 
@@ -316,7 +303,7 @@ const SettingSection<ObjectiveFunction>& objectiveSection() {
              .meaning =
                  "Location of the transformation: added after the division by the standard deviation (method 1), "
                  "or the mean (method 2). Without it, from the search's initial sample."})},
-       nameOfObjective}};
+       itemName<Function>([](const Function& function) { return function.name; })}};
   return section;
 }
 

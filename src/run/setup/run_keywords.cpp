@@ -10,9 +10,6 @@
 namespace mirevo {
 namespace {
 
-/// Rows of these settings bear on no result.
-constexpr bool kNotOfResults = false;
-
 constexpr CodeName kRestartNames[] = {{0, "no"}, {1, "continue"}, {2, "continue and repeat failed runs"}};
 
 /// Sections that are accepted and not used.
