@@ -159,7 +159,7 @@ void OptimisationTask::readSurrogate(const TaskReading& reading, const SetupSect
 }
 
 std::string OptimisationTask::description() const {
-  return fmt::format("Parameter optimisation: {}{}", method ? method->facts().longName : "",
+  return fmt::format("Parameter optimisation: {}{}", method->facts().longName,
                      usesSurrogate() ? " with surrogate model" : "");
 }
 
@@ -180,7 +180,7 @@ std::optional<OneSlotOnly> OptimisationTask::needsOneSlot() const {
 SearchSummary OptimisationTask::search(const TaskContext& context) const {
   UniformGenerator random(randomSeed);
   SearchProblem problem{searchBounds(context.space), stopping, initialSample, {}, context.evaluator, random};
-  problem.earlierSearches = earlierSearches;
+  problem.earlierSearches = earlierSearches_;
   if (method->facts().drawsInitialSample && initialSample.generation == SampleGeneration::fromFile) {
     problem.givenSample = loadInitialSample(initialSample.fileName, context.space);
   }
@@ -190,8 +190,7 @@ SearchSummary OptimisationTask::search(const TaskContext& context) const {
 }
 
 TaskOutcome OptimisationTask::run(const TaskContext& context) {
-  const bool isKnownUse = surrogateUse == SurrogateUse::no || surrogateUse == SurrogateUse::yes;
-  if (!isKnownUse || !method) return {std::string(kEndOfTask)};
+  if (surrogateUse != SurrogateUse::no && surrogateUse != SurrogateUse::yes) return {std::string(kEndOfTask)};
 
   const SearchSummary summary = search(context);
   context.log.line("");
@@ -208,7 +207,6 @@ TaskOutcome OptimisationTask::run(const TaskContext& context) {
 
 TaskReport OptimisationTask::report() const {
   TaskReport report;
-  if (!method) return report;
   report.algorithm = method->facts().name.name;
   report.populationSize = static_cast<int>(method->populationSize());
   if (usesSurrogate()) report.surrogate = surrogateModelName(surrogate);
@@ -216,7 +214,7 @@ TaskReport OptimisationTask::report() const {
 }
 
 std::optional<RaisedBudget> OptimisationTask::raisedBudget(const SearchHistory& history) const {
-  if (!method || stopping.maxEvaluations <= history.budget) return std::nullopt;
+  if (stopping.maxEvaluations <= history.budget) return std::nullopt;
   return method->raiseBudget(history, stopping, initialSample);
 }
 

@@ -27,8 +27,10 @@ class OptimisationTask final : public Task {
   TaskOutcome run(const TaskContext& context) override;
   TaskReport report() const override;
   std::optional<RaisedBudget> raisedBudget(const SearchHistory& history) const override;
+  void continueFrom(std::vector<EarlierSearch> searches) override { earlierSearches_ = std::move(searches); }
+  std::vector<EarlierSearch> earlierSearches() const override { return earlierSearches_; }
 
-  std::unique_ptr<SearchMethod> method;  ///< nullptr where the setup names none
+  std::unique_ptr<SearchMethod> method;  ///< nullptr before it is read, and never then
   SurrogateUse surrogateUse = SurrogateUse::no;
   InitialSampleSettings initialSample;
   StoppingCriteria stopping;
@@ -36,11 +38,13 @@ class OptimisationTask final : public Task {
 
  private:
   /// Whether a surrogate model assists the search.
-  bool usesSurrogate() const { return surrogateUse == SurrogateUse::yes && method && method->facts().usesSurrogate; }
+  bool usesSurrogate() const { return surrogateUse == SurrogateUse::yes && method->facts().usesSurrogate; }
   void readMethod(const TaskReading& reading, const SetupSection& section);
   void readStopping(const SetupSection& section);
   void readSurrogate(const TaskReading& reading, const SetupSection& section, const SetupSection& stoppingSection);
   SearchSummary search(const TaskContext& context) const;
+
+  std::vector<EarlierSearch> earlierSearches_;
 };
 
 }  // namespace mirevo

@@ -151,7 +151,6 @@ int SensitivityTask::plannedEvaluations(std::size_t variableCount) const {
 
 TaskOutcome SensitivityTask::run(const TaskContext& context) {
   TaskOutcome outcome{std::string(kEndOfTask)};
-  if (type != SensitivityType::local) return outcome;
   const LocalSensitivity sensitivity = localSensitivity(settings, context.space, context.evaluator);
   const AnalysisNames names = analysisNames(context);
   outcome.report = formatSensitivity(sensitivity, names);

@@ -127,9 +127,10 @@ class Task {
 
   /// Of a search, what becomes of an earlier one with a smaller budget; nothing where the budget was not raised.
   virtual std::optional<RaisedBudget> raisedBudget(const SearchHistory& history) const;
+  /// Of a search: that it continues others with smaller budgets, which the run that is continued has made.
+  virtual void continueFrom(std::vector<EarlierSearch> searches);
+  virtual std::vector<EarlierSearch> earlierSearches() const { return {}; }
 
-  /// Of a search that continues others with smaller budgets; not from the setup but from the run that is continued.
-  std::vector<EarlierSearch> earlierSearches;
   /// Of the initial sample and of the uncertainty analysis: one setting.
   std::int32_t randomSeed = 1;
 };

@@ -3,6 +3,7 @@
 #include <fmt/format.h>
 #include <gmock/gmock.h>
 
+#include "algorithms/searches/population_method.h"
 #include "run/setup_fixture.h"
 #include "run/tasks/optimisation_task.h"
 
@@ -37,7 +38,7 @@ TEST_F(SetupReaderTest, FillsTheConfigurationOfAnOptimisation) {
   EXPECT_EQ(config.measureFile, folder_ / "model/measures.txt");
   const auto& task = dynamic_cast<const OptimisationTask&>(*config.task);
   EXPECT_EQ(task.method->populationSize(), 20);
-  EXPECT_EQ(task.method->simplex.pointCount, 5);
+  EXPECT_EQ(dynamic_cast<const PopulationMethod&>(*task.method).simplex.pointCount, 5);
   EXPECT_EQ(task.randomSeed, -77);
   EXPECT_EQ(config.simultaneousSimulations, 4);
   EXPECT_EQ(config.plannedEvaluations(), 500);

@@ -9,7 +9,6 @@
 #include "refusal.h"
 #include "run/tasks/optimisation_task.h"
 #include "run/tasks/scenario_task.h"
-#include "run/tasks/sensitivity_task.h"
 
 namespace mirevo {
 namespace {
@@ -83,12 +82,8 @@ TEST_F(TasksTest, AScenarioValueWithoutALogarithmIsRefusedByRunAndParameter) {
   EXPECT_TRUE(evaluator_.batches.empty());
 }
 
-TEST_F(TasksTest, WhatDoesNotExistRunsNothingAndEndsNormally) {
-  SensitivityTask sensitivity;
-  sensitivity.type = SensitivityType{1};
-  EXPECT_EQ(run(sensitivity), "Normal termination");
+TEST_F(TasksTest, AnUnknownUseOfASurrogateModelRunsNothingAndEndsNormally) {
   OptimisationTask optimisation;
-  EXPECT_EQ(run(optimisation), "Normal termination") << "no search has the number";
   optimisation.method = searchMethods().make(SetupValue(2));
   optimisation.surrogateUse = SurrogateUse{2};
   EXPECT_EQ(run(optimisation), "Normal termination");
