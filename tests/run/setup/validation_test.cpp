@@ -2,6 +2,7 @@
 
 #include <cctype>
 #include <cmath>
+#include <tuple>
 
 #include <fmt/format.h>
 #include <gmock/gmock.h>
@@ -270,18 +271,27 @@ TEST_F(ValidationTest, CodesAreTakenByNumberOrByName) {
         ++compared;
       }
     }
-    const std::string error = failureOf(withValue(tried.text, tried.section->path, tried.row->name(), "'nonesuch'"));
-    const std::string_view section = tried.section->path;
-    EXPECT_THAT(error, StartsWith("Error: Unable to read keyword in section "));
-    EXPECT_THAT(error, HasSubstr(fmt::format("{}: expected an integer within 32 bits or one of the names '{}'",
-                                             tried.row->name(), tried.row->facts.codes.front().name)))
-        << section;
+    for (const auto& [wrong, message, verb] :
+         {std::tuple{"'nonesuch'", "Error: Unable to read keyword in section ", ": expected"},
+          {"2.0", "Error: Unable to read keyword in section ", ": expected"},
+          {"nonesuch", "Error: Unable to open ", " takes"}}) {
+      const std::string error = failureOf(withValue(tried.text, tried.section->path, tried.row->name(), wrong));
+      EXPECT_THAT(error, StartsWith(message));
+      EXPECT_THAT(error, HasSubstr(fmt::format("{}{} an integer within 32 bits or one of the names '{}'",
+                                               tried.row->name(), verb, tried.row->facts.codes.front().name)));
+    }
   }
   EXPECT_GT(compared, 40);
+  const std::string wanted =
+      "an integer within 32 bits or one of the names 'scenarios', 'sensitivity', 'optimisation', 'uncertainty', ";
   EXPECT_THAT(failure("Option = 2 => 'optimsation'"),
-              HasSubstr("setup.kdx:3:14: Option: expected an integer within 32 bits or one of the names 'scenarios', "
-                        "'sensitivity', 'optimisation', 'uncertainty', found the text \"optimsation\", did you mean "
-                        "'optimisation'?"));
+              HasSubstr("setup.kdx:3:14: Option: expected " + wanted +
+                        "found the text \"optimsation\", did you mean 'optimisation'?"));
+  EXPECT_THAT(failure("Option = 2 => 2.0"), HasSubstr("Option: expected " + wanted + "found 2.0"));
+  EXPECT_THAT(failure("Option = 2 => Optimisation  // a search"),
+              HasSubstr("setup.kdx:3:14: expected a number, a date or a text between quotes, found \"Optimisation\"; "
+                        "Option takes " +
+                        wanted + "did you mean 'optimisation'?"));
   EXPECT_THAT(logOf("Algorithm_Type = 1 => 'pse'"), HasSubstr("  Algorithm_Type = 1 ('PSE')\n"));
 }
 
