@@ -267,43 +267,51 @@ const SettingSection<SeriesReference>& observationFileSection() {
   return section;
 }
 
-const SettingSection<ObjectiveFunction>& objectiveSection() {
-  using Function = ObjectiveFunction;
-  static const SettingSection<ObjectiveFunction> section{
+const SettingSection<ObjectiveSection>& objectiveSection() {
+  using Section = ObjectiveSection;
+  static const SettingSection<Section> section{
       {"ObjectiveFunctions/OBJECTIVE_FUNCTIONS/OBJECTIVE_n",
        "for each item",
        "An objective function over the output measures that name it.",
-       {setting<&Function::name>({.name = "Name",
-                                  .type = KeywordType::name,
-                                  .meaning = "Unique name, by which output measures refer to it."}),
-        setting<&Function::functionType>(
+       {checked<Section>(setting<Section>([](auto& s) -> auto& { return s.function.name; },
+                                          {.name = "Name",
+                                           .type = KeywordType::name,
+                                           .meaning = "Unique name, by which output measures refer to it.",
+                                           .checkOrder = 1}),
+                         [](const Section& s) { return validateObjectiveFunction(s.function, s.names); }),
+        setting<Section>(
+            [](auto& s) -> auto& { return s.function.functionType; },
             {.name = "Function_Type",
              .defaultValue = "0",
              .range = between(0, 2),
              .codes = kFunctionTypeNames,
              .refusal = "Error: Function type invalid for objective function ",
              .meaning = "Over its output measures: 0 sum of the values, 1 of the absolute values, 2 of the squares."}),
-        setting<&Function::weight>({.name = "Weight",
-                                    .defaultValue = "1.0",
-                                    .range = kNonNegative,
-                                    .refusal = "Error: Weight invalid for objective function ",
-                                    .meaning = "Weight in the aggregate."}),
-        setting<&Function::standardDeviation>(
+        setting<Section>([](auto& s) -> auto& { return s.function.weight; },
+                         {.name = "Weight",
+                          .defaultValue = "1.0",
+                          .range = kNonNegative,
+                          .refusal = "Error: Weight invalid for objective function ",
+                          .meaning = "Weight in the aggregate."}),
+        setting<Section>(
+            [](auto& s) -> auto& { return s.function.standardDeviation; },
             {.name = "Standard_Deviation",
              .defaultValue = kNoDefault,
              .range = kPositive,
              .refusal = "Error: Standard deviation invalid for objective function ",
              .unit = "of the function",
              .meaning = "Scale of the transformation of aggregation methods 1 and 2. Without it, that of the search's "
-                        "initial sample."}),
-        setting<&Function::location>(
+                        "initial sample.",
+             .checkOrder = 2}),
+        setting<Section>(
+            [](auto& s) -> auto& { return s.function.location; },
             {.name = "Location",
              .defaultValue = kNoDefault,
              .unit = "of the function",
              .meaning =
                  "Location of the transformation: added after the division by the standard deviation (method 1), "
                  "or the mean (method 2). Without it, from the search's initial sample."})},
-       itemName<Function>([](const Function& function) { return function.name; })}};
+       itemName<Section>([](const Section& s) { return s.function.name; })}};
   return section;
 }
 

@@ -136,14 +136,14 @@ void OptimisationTask::readStopping(const SetupSection& section) {
 void OptimisationTask::readSurrogate(const TaskReading& reading, const SetupSection& section,
                                      const SetupSection& stoppingSection) {
   const SetupSection control = section.open(nameInside(surrogateSection().row));
-  control.read(surrogateSection(), surrogate);
-  std::optional<double> available;
-  if (usesSurrogate()) available = evaluationsAfter(*method, surrogate.initialGenerations);
-  control.require(validateSurrogateControl(surrogate, reading.variableCount, available));
+  SurrogateSection filled{surrogate, reading.variableCount};
+  control.read(surrogateSection(), filled);
   if (!usesSurrogate()) {
     section.warn(kSurrogateKeyword, fmt::format("{} uses no surrogate model", method->facts().longName));
     return;
   }
+  const double available = evaluationsAfter(*method, surrogate.initialGenerations);
+  control.require(validateSurrogateControl(surrogate, available));
   // A budget that is spent before the surrogate model has enough evaluated sets is spent without it.
   const auto sample = static_cast<double>(method->populationSize());
   const auto sets = static_cast<double>(leastSetCount(surrogate, reading.variableCount));

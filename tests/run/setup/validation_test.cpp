@@ -70,7 +70,7 @@ const std::vector<Refused>& refusedValues() {
       {"Function_Name = 'Flow' => 'Flwo'", "Invalid function name for output measure Flow error",
        "Function_Name: no objective function is called \"Flwo\""},
       {"TqSEKdxListItemCount = 1\n      [OBJECTIVE_1] => 2\n      [OBJECTIVE_1] & [/OBJECTIVE_1] => "
-       "[/OBJECTIVE_1][OBJECTIVE_2]\nName = 'Flow'\n[/OBJECTIVE_2]",
+       "[/OBJECTIVE_1][OBJECTIVE_2]\nName = 'Flow'\nStandard_Deviation = 0.0\n[/OBJECTIVE_2]",
        "Invalid objective function name Flow. Name used more than once.", "setup.kdx:95:8"},
       {"TqSEKdxListItemCount = 1\n      [OBJECTIVE_1] => 0\n      [OBJECTIVE_1]", "No objective functions defined",
        "found 0"},
@@ -104,7 +104,8 @@ const std::vector<Refused>& refusedValues() {
       {"'sample.txt' => '/dev/zero'", "Unable to open /dev/zero", "Not a regular file"},
       {"'sample.txt' => ''", "Unable to open ", "expected the name of a file, found a blank text"},
       {"'sample.txt' => 'none.txt'", "Unable to open none.txt", "No such file"},
-      {"Neighbourhood_Size = 60 => 5", "Invalid neighbourhood size for surrogate modelling optimisation",
+      {"Neighbourhood_Size = 60 => 5 & Sampling_rate = 30 => 0",
+       "Invalid neighbourhood size for surrogate modelling optimisation",
        "at least the 6 coefficients of a quadratic polynomial in 2 parameters, or 0"},
       {"Neighbourhood_Size = 60 => 61",
        "Population size and/or initial No. of generations too small for surrogate modelling optimisation",
