@@ -55,6 +55,9 @@ std::vector<std::string_view> splitAt(std::string_view text, char separator,
 /// The lines of `text`, without their line ends (LF or CRLF); a last line without an end counts.
 std::vector<std::string_view> splitLines(std::string_view text);
 
+/// `text` with a blank for every control character, line ends among them.
+std::string onOneLine(std::string_view text);
+
 /// A name as a column's heading: nothing in it that a reader of tab-separated values takes for something else.
 std::string columnName(std::string_view name);
 

@@ -129,7 +129,7 @@ void RunDriver::buildModel() {
   aggregator_ = std::make_unique<ObjectiveAggregator>(config_.objectives, config_.aggregationMethod);
   // Before the process folders are made anew: a run that cannot be taken up again leaves everything as it is.
   results_.emplace(config_, parameters_->searchSpace(), filePrefix_);
-  if (config_.task) config_.task->earlierSearches = results_->earlierSearches();
+  if (config_.task) config_.task->continueFrom(results_->earlierSearches());
   launcher_ = std::make_unique<PosixProcessLauncher>();
   signalState.haltProcesses = haltProcessesFromSignal;
   const int slotCount = state_.job->hasWorkers() ? 0 : config_.simultaneousSimulations;  // the master runs no model

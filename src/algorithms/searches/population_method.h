@@ -4,6 +4,10 @@
 
 namespace mirevo {
 
+struct SimplexSettings {
+  std::int32_t pointCount = 2;
+};
+
 /// What the searches with a population have in common.
 class PopulationMethod : public SearchMethod {
  public:
@@ -11,6 +15,9 @@ class PopulationMethod : public SearchMethod {
   /// Continues behind a raised budget as if it had been so high from the start.
   RaisedBudget raiseBudget(const SearchHistory& history, const StoppingCriteria& stopping,
                            const InitialSampleSettings& sample) const final;
+
+  /// SCE's subcomplex and PSE's simplex are one setting.
+  SimplexSettings simplex;
 };
 
 }  // namespace mirevo

@@ -76,7 +76,4 @@ class PseMethod final : public PopulationMethod {
   PseSettings settings;
 };
 
-/// That a simplex has no more points than the population.
-std::optional<SettingRefusal> validatePseControl(const PseMethod& method);
-
 }  // namespace mirevo

@@ -89,7 +89,4 @@ class SceMethod final : public PopulationMethod {
   SceSettings settings;
 };
 
-/// That a subcomplex has no more points than its complex.
-std::optional<SettingRefusal> validateSceControl(const SceMethod& method);
-
 }  // namespace mirevo

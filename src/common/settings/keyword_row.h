@@ -63,6 +63,9 @@ constexpr ValueRange between(double lowest, double highest) {
 /// Default of an optional keyword without a value of its own.
 inline constexpr std::string_view kNoDefault = "none";
 
+/// KeywordFacts::bearsOnResults of settings that bear on no result.
+inline constexpr bool kNotOfResults = false;
+
 /// Names of settings that are a yes or a no.
 inline constexpr CodeName kNoYesNames[] = {{0, "no"}, {1, "yes"}};
 
@@ -83,7 +86,7 @@ struct KeywordFacts {
   /// Fixed text for a value outside the range; a blank at its end stands before the name of the item.
   std::string_view refusal = {};
   std::string_view unit = {};
-  std::string_view meaning = {};
+  std::string meaning = {};
   bool bearsOnResults = true;  ///< another value may give other results: no run is continued with it
   int checkOrder = 0;          ///< values are checked in this order, those of the same order as they are read
 };
@@ -168,7 +171,7 @@ KeywordRow setting(FieldOf, KeywordFacts facts) {
   const KeywordType type = facts.type.value_or(
       std::is_same_v<Field, bool> || !facts.codes.empty() ? KeywordType::code : settings_detail::typeOf<Field>());
   if (std::is_same_v<Field, bool> && facts.codes.empty()) facts.codes = kNoYesNames;
-  return {facts, type, [](void* settings, const SetupValue& value) {
+  return {std::move(facts), type, [](void* settings, const SetupValue& value) {
             settings_detail::assign(FieldOf{}(*static_cast<Settings*>(settings)), value);
           }};
 }
@@ -177,17 +180,17 @@ KeywordRow setting(FieldOf, KeywordFacts facts) {
 template <auto Member, class Settings, class Field>
 KeywordRow memberSetting(Field Settings::*, KeywordFacts facts) {
   return setting<Settings>(
-      [](Settings & settings) -> auto& { return settings.*Member; }, facts);
+      [](Settings & settings) -> auto& { return settings.*Member; }, std::move(facts));
 }
 template <auto Member>
 KeywordRow setting(KeywordFacts facts) {
-  return memberSetting<Member>(Member, facts);
+  return memberSetting<Member>(Member, std::move(facts));
 }
 
 /// A coded row whose value is handed on as it was read, a number or a name: `take(settings, value)`.
 template <class Settings, class Take>
 KeywordRow choice(Take, KeywordFacts facts) {
-  return {facts, KeywordType::code,
+  return {std::move(facts), KeywordType::code,
           [](void* settings, const SetupValue& value) { Take{}(*static_cast<Settings*>(settings), value); }};
 }
 
@@ -199,6 +202,12 @@ KeywordRow checked(KeywordRow row, Check) {
     return Check{}(*static_cast<const Settings*>(settings));
   };
   return row;
+}
+
+/// SectionRow::itemName by `nameOf(settings)`, a lambda without captures.
+template <class Settings, class NameOf>
+auto itemName(NameOf) {
+  return [](const void* settings) -> std::string { return NameOf{}(*static_cast<const Settings*>(settings)); };
 }
 
 /// The row of a list's count.

@@ -91,10 +91,18 @@ class KdxSection final {
   NameIndex sectionIndex_;
 };
 
+/// A text without quotes where a value should be.
+struct KdxUnquotedText {
+  std::string text;
+  std::string keyword = {};                ///< whose value it should be
+  std::vector<std::string> sections = {};  ///< around the keyword, from the outside in
+};
+
 /// Why a KDX text cannot be read: the first place where it breaks, and what was expected there.
 struct KdxSyntaxError {
   KdxPosition position;
   std::string message;
+  std::optional<KdxUnquotedText> unquoted = {};  ///< where that is the fault
 };
 
 /// A parsed KDX text: its targets are the sections of `root`.

@@ -1,7 +1,8 @@
 #pragma once
 
-#include <optional>
+#include <span>
 #include <string>
+#include <string_view>
 #include <variant>
 
 #include "common/settings/keyword_row.h"
@@ -19,6 +20,11 @@ struct SetupValueError {
 /// that has the form of a date where a date is, nothing else is turned into another type. Texts lose trailing blanks. A
 /// name of a coded keyword becomes its number where it has one.
 std::variant<SetupValue, SetupValueError> convertSetupValue(const KeywordRow& row, const KdxKeyword& keyword);
+
+/// What a coded keyword takes: "an integer within 32 bits or one of the names 'SCE', 'PSE'".
+std::string wantedCode(std::span<const CodeName> codes);
+/// ", did you mean 'PSE'?" where a name is near to what was written; else empty.
+std::string nearestCode(std::span<const CodeName> codes, std::string_view written);
 
 /// The default of a row that has one.
 SetupValue defaultSetupValue(const KeywordRow& row);

@@ -3,6 +3,7 @@
 #include <cstdint>
 #include <functional>
 #include <memory>
+#include <optional>
 #include <span>
 #include <string>
 #include <string_view>
@@ -27,7 +28,8 @@ struct SensitivitySettings;
 
 /// What is always true of a task, whatever its settings.
 struct TaskFacts {
-  CodeName name;  ///< in setups; the name also tells reports which task it is: "optimisation"
+  CodeName name;              ///< in setups; the name also tells reports which task it is: "optimisation"
+  std::string_view longName;  ///< "parameter optimisation"
   ResultFileNames resultFiles;
 };
 
@@ -79,6 +81,12 @@ struct TaskReport {
   const SensitivitySettings* sensitivity = nullptr;  ///< of a local sensitivity analysis
 };
 
+/// Why more slots than one are refused.
+struct OneSlotOnly {
+  std::string_view refusal;  ///< the fixed text
+  std::string_view keyword;  ///< whose value it is that needs one slot
+};
+
 /// A task together with its settings: everything that a setup, a run, a restart or a report asks about it. One form per
 /// task, in a file pair of its own; tasks.h lists them.
 class Task {
@@ -109,8 +117,8 @@ class Task {
   virtual bool drawsRandomNumbers() const { return false; }
   /// Whether it works with simulated values at the observation times, which the results then have to hold.
   virtual bool keepsSimulatedValues() const { return false; }
-  /// Whether its batches fill several slots; where they do not, more than one is refused.
-  virtual bool runsInParallel() const { return true; }
+  /// Nothing where its batches fill several slots.
+  virtual std::optional<OneSlotOnly> needsOneSlot() const { return std::nullopt; }
 
   /// Runs it. Throws FatalError and RunCancelled.
   virtual TaskOutcome run(const TaskContext& context) = 0;
@@ -119,9 +127,10 @@ class Task {
 
   /// Of a search, what becomes of an earlier one with a smaller budget; nothing where the budget was not raised.
   virtual std::optional<RaisedBudget> raisedBudget(const SearchHistory& history) const;
+  /// Of a search: that it continues others with smaller budgets, which the run that is continued has made.
+  virtual void continueFrom(std::vector<EarlierSearch> searches);
+  virtual std::vector<EarlierSearch> earlierSearches() const { return {}; }
 
-  /// Of a search that continues others with smaller budgets; not from the setup but from the run that is continued.
-  std::vector<EarlierSearch> earlierSearches;
   /// Of the initial sample and of the uncertainty analysis: one setting.
   std::int32_t randomSeed = 1;
 };

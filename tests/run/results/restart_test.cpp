@@ -165,7 +165,7 @@ TEST_F(EarlierRunTest, ARaisedBudgetOfDdsIsAnotherSearch) {
                {20, 10, {{10, 10}}, {10}}};     // the second search had not begun
   for (const auto& c : cases) {
     RunConfig then = config(c.then);
-    then.task->earlierSearches = c.before;
+    then.task->continueFrom(c.before);
     std::string some;
     for (int number = 1; number <= c.count; ++number) some += row(number);
     taken(then, config(40), some);
