@@ -2,6 +2,7 @@
 
 #include <cmath>
 #include <numeric>
+#include <tuple>
 #include <vector>
 
 #include <gtest/gtest.h>
@@ -56,18 +57,16 @@ TEST(MuskingumRiver, KeepsTheWaterAndItsTravelTimeForAnyReach) {
 }
 
 TEST(MuskingumRiver, TakesAsFewStepsAsItCan) {
-  const struct {
-    double k, x;
-    int steps, reaches;
-  } cases[] = {{1.0, 0.2, 1, 1},    // 0.4 <= 1 <= 1.6
-               {4.0, 0.2, 1, 2},    // 1.6 <= 2 <= 6.4
-               {0.25, 0.2, 3, 1},   // 0.3 <= 1 <= 1.2
-               {0.1, 0.4, 9, 1},    // 0.72 <= 1 <= 1.08
-               {1.3, 0.45, 3, 4}};  // 1.17 and 1.43 hold no whole number; 2.34 and 2.86 none, 3.51 and 4.29 do
-  for (const auto& c : cases) {
-    const MuskingumRiver river(c.k, c.x);
-    EXPECT_EQ(river.steps(), c.steps) << c.k;
-    EXPECT_EQ(river.reaches(), c.reaches) << c.k;
+  const std::tuple<double, double, int, int> cases[] = {
+      {1.0, 0.2, 1, 1},    // 0.4 <= 1 <= 1.6
+      {4.0, 0.2, 1, 2},    // 1.6 <= 2 <= 6.4
+      {0.25, 0.2, 3, 1},   // 0.3 <= 1 <= 1.2
+      {0.1, 0.4, 9, 1},    // 0.72 <= 1 <= 1.08
+      {1.3, 0.45, 3, 4}};  // 1.17 and 1.43 hold no whole number; 2.34 and 2.86 none, 3.51 and 4.29 do
+  for (const auto& [k, x, steps, reaches] : cases) {
+    const MuskingumRiver river(k, x);
+    EXPECT_EQ(river.steps(), steps) << k;
+    EXPECT_EQ(river.reaches(), reaches) << k;
   }
 }
 

@@ -15,8 +15,9 @@ class FunctionEvaluator final : public Evaluator {
 
   explicit FunctionEvaluator(Function function) : function_(std::move(function)) {}
 
-  std::vector<EvaluationResult> evaluateParameterSets(std::span<const ParameterSet> sets, DispatchMode) override {
+  std::vector<EvaluationResult> evaluateParameterSets(std::span<const ParameterSet> sets, DispatchMode mode) override {
     batches.emplace_back(sets.begin(), sets.end());
+    modes.push_back(mode);
     std::vector<EvaluationResult> results;
     for (const ParameterSet& set : sets) {
       results.push_back(function_(set));
@@ -27,6 +28,7 @@ class FunctionEvaluator final : public Evaluator {
   void settleAggregates(std::span<EvaluationResult> sample) override { settledSizes.push_back(sample.size()); }
 
   std::vector<std::vector<ParameterSet>> batches;
+  std::vector<DispatchMode> modes;  ///< of the batches
   std::vector<std::size_t> settledSizes;
   int evaluationCount = 0;
 
@@ -40,6 +42,13 @@ inline EvaluationResult resultOf(double value) {
   result.measureValues = {value};
   result.objectiveValues = {value};
   result.aggregate = value;
+  return result;
+}
+
+/// The result of a run that failed.
+inline EvaluationResult failedResult() {
+  EvaluationResult result = resultOf(kFailedRunValue);
+  result.failure.emplace();
   return result;
 }
 

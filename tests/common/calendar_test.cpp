@@ -1,5 +1,7 @@
 #include "common/calendar.h"
 
+#include <utility>
+
 #include <gtest/gtest.h>
 
 namespace mirevo {
@@ -24,20 +26,17 @@ TEST(Calendar, EveryDayOfFourCenturiesFollowsTheOneBefore) {
 }
 
 TEST(Calendar, CountsFromMarchOfTheYearZeroInEveryYear) {
-  const struct {
-    DateRecord date;
-    std::int64_t day;
-  } cases[] = {{{0, 3, 1}, 0},
-               {{0, 2, 29}, -1},
-               {{-1, 3, 1}, -366},
-               {{1970, 1, 1}, 719468},
-               {{32767, 12, 31}, 11967900 + 306 - 1},
-               {{32768, 2, 29}, 11967900 + 306 + 59},
-               {{2147483647, 12, 31}, 784352296244}};
-  for (const auto& c : cases) {
+  const std::pair<DateRecord, std::int64_t> cases[] = {{{0, 3, 1}, 0},
+                                                       {{0, 2, 29}, -1},
+                                                       {{-1, 3, 1}, -366},
+                                                       {{1970, 1, 1}, 719468},
+                                                       {{32767, 12, 31}, 11967900 + 306 - 1},
+                                                       {{32768, 2, 29}, 11967900 + 306 + 59},
+                                                       {{2147483647, 12, 31}, 784352296244}};
+  for (const auto& [date, day] : cases) {
     using namespace date_field;
-    EXPECT_EQ(dayNumber(c.date[kYear], c.date[kMonth], c.date[kDay]), c.day) << c.date[kYear];
-    EXPECT_EQ(dateOfSecond(c.day * 86400), c.date) << c.day;
+    EXPECT_EQ(dayNumber(date[kYear], date[kMonth], date[kDay]), day) << date[kYear];
+    EXPECT_EQ(dateOfSecond(day * 86400), date) << day;
   }
 }
 

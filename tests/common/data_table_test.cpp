@@ -7,12 +7,10 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "matchers.h"
+
 namespace mirevo {
 namespace {
-
-using ::testing::ElementsAre;
-using ::testing::HasSubstr;
-using ::testing::Not;
 
 TEST(DataTable, TextsComeBackAsTheyWereWhateverTheyHold) {
   const std::vector<std::string> texts{"#1",  "\"open",     "a\tb\nc\r",   "\\x23 \\n", "",

@@ -4,6 +4,8 @@
 #include <limits>
 #include <optional>
 #include <string>
+#include <tuple>
+#include <utility>
 #include <vector>
 
 #include <gtest/gtest.h>
@@ -76,18 +78,14 @@ TEST(Text, SplitsAtASeparatorIntoAtMostSoManyParts) {
 }
 
 TEST(Text, TakesNumbersOfSoManyDigitsOrNothing) {
-  const struct {
-    const char* text;
-    std::size_t least, most;
-    std::optional<std::int64_t> number;
-    const char* rest;
-  } cases[] = {{"0087 OK", 1, 9, 87, " OK"},     {"2001-01", 4, 4, 2001, "-01"},
-               {"20010", 2, 4, 2001, "0"},       {"201-01", 4, 4, std::nullopt, "201-01"},
-               {"-5", 1, 9, std::nullopt, "-5"}, {"99999999999999999999", 1, 99, std::nullopt, "99999999999999999999"}};
-  for (const auto& c : cases) {
-    std::string_view text = c.text;
-    EXPECT_EQ(takeNumber(text, c.least, c.most), c.number) << c.text;
-    EXPECT_EQ(text, c.rest);
+  const std::tuple<const char*, std::size_t, std::size_t, std::optional<std::int64_t>, const char*> cases[] = {
+      {"0087 OK", 1, 9, 87, " OK"},     {"2001-01", 4, 4, 2001, "-01"},
+      {"20010", 2, 4, 2001, "0"},       {"201-01", 4, 4, std::nullopt, "201-01"},
+      {"-5", 1, 9, std::nullopt, "-5"}, {"99999999999999999999", 1, 99, std::nullopt, "99999999999999999999"}};
+  for (const auto& [text, least, most, number, rest] : cases) {
+    std::string_view left = text;
+    EXPECT_EQ(takeNumber(left, least, most), number) << text;
+    EXPECT_EQ(left, rest);
   }
 }
 

@@ -4,12 +4,10 @@
 
 #include "evaluation/evaluation_fixture.h"
 #include "evaluation/fake_launcher.h"
+#include "matchers.h"
 
 namespace mirevo {
 namespace {
-
-using testing::ElementsAre;
-using testing::HasSubstr;
 
 class LocalEvaluatorTest : public EvaluationTest {
  protected:
@@ -148,7 +146,7 @@ TEST_F(LocalEvaluatorTest, SettlesTheTransformationFromTheSampleWithoutItsFailur
   EXPECT_NEAR(sample[0].aggregate, 0.23975006109347674, 1e-12);
   EXPECT_NEAR(sample[2].aggregate, 0.7602499389065233, 1e-12);
   EXPECT_EQ(sample[1].aggregate, kFailedRunValue);
-  EXPECT_THAT(observer_.events.back(), ::testing::HasSubstr("Standard deviation = 1.414"));
+  EXPECT_THAT(observer_.events.back(), HasSubstr("Standard deviation = 1.414"));
 }
 
 TEST_F(LocalEvaluatorTest, WhatAnEarlierRunHasEvaluatedIsNotRunAgain) {
@@ -161,9 +159,9 @@ TEST_F(LocalEvaluatorTest, WhatAnEarlierRunHasEvaluatedIsNotRunAgain) {
   EXPECT_EQ(results[2].failure->reason, "in the past");
   EXPECT_EQ(failedRuns_->failedCount(), 1);
   EXPECT_EQ(launcher.starts, 2);
-  EXPECT_THAT(observer_.events,
-              testing::ElementsAre(
-                  "replay 1 a=2 OK", "replay 3 a=4 FAILED", "Evaluation of parameter set No. 2 initiated",
+  EXPECT_THAT(
+      observer_.events,
+      ElementsAre("replay 1 a=2 OK", "replay 3 a=4 FAILED", "Evaluation of parameter set No. 2 initiated",
                   "Evaluation of parameter set No. 4 initiated", "Evaluation of parameter set No. 2 completed: OK",
                   "record 2 a=3 OK", "Evaluation of parameter set No. 4 completed: OK", "record 4 a=1.5 OK"));
   // A final run is made for its folder, but has its row already.
@@ -179,9 +177,9 @@ TEST_F(LocalEvaluatorTest, AnotherSetUnderTheSameNumberIsNoReplay) {
   EXPECT_THAT(refusalOf([&] {
                 evaluate(evaluator, {1.0, std::nextafter(3.0, 4.0)});
               }),
-              testing::StartsWith("Error: Unable to continue the earlier run\n"
-                                  "evaluation No. 2 has a = 3 in the earlier results, and 3.0000000000000004 now, "
-                                  "though the settings are the same."));
+              StartsWith("Error: Unable to continue the earlier run\n"
+                         "evaluation No. 2 has a = 3 in the earlier results, and 3.0000000000000004 now, "
+                         "though the settings are the same."));
 }
 
 TEST_F(LocalEvaluatorTest, TheFoldersOfTheFirstFailedRunsAreKept) {
@@ -197,7 +195,7 @@ TEST_F(LocalEvaluatorTest, TheFoldersOfTheFirstFailedRunsAreKept) {
   EXPECT_FALSE(folder_.exists("run_Failed1")) << "of the earlier run";
   EXPECT_FALSE(folder_.exists("run_Failed2")) << "no model run";
   EXPECT_EQ(folder_.read("run_Failed3/mirevo_batch.log"), "why");
-  EXPECT_THAT(folder_.read("run_Failed4/parameters.txt"), testing::EndsWith(" 3\n"));
+  EXPECT_THAT(folder_.read("run_Failed4/parameters.txt"), EndsWith(" 3\n"));
   EXPECT_FALSE(folder_.exists("run_Failed5"));
 }
 

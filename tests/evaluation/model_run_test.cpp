@@ -1,17 +1,16 @@
 #include "evaluation/model_run.h"
 
 #include <tuple>
+#include <utility>
 
 #include "evaluation/evaluation_fixture.h"
 #include "evaluation/evaluation_ledger.h"
 #include "evaluation/fake_launcher.h"
+#include "matchers.h"
 
 namespace mirevo {
 namespace {
 
-using testing::AllOf;
-using testing::ElementsAre;
-using testing::HasSubstr;
 using Kind = EvaluationFailure::Kind;
 
 class ModelRunTest : public EvaluationTest {
@@ -42,12 +41,8 @@ class ModelRunTest : public EvaluationTest {
 
 TEST_F(ModelRunTest, WhatAModelMayDoWrongIsAFailedEvaluationWithItsReason) {
   const std::string file = folder_ / "run_Process1/simulated.csv";
-  const struct {
-    const char* name;
-    std::string content;  ///< of simulated.csv; "-" writes none
-    Kind kind;
-    std::string reason;
-  } cases[] = {
+  // content: of simulated.csv; "-" writes none
+  const std::tuple<const char*, std::string, Kind, std::string> cases[] = {
       {"nothing", "-", Kind::resultsNotWritten, "the batch ended well but did not write " + file},
       {"empty file", "", Kind::resultsNotReadable, file},
       {"header alone", "time,flow\n", Kind::resultsNotReadable, file + ": expected at least one time step, found none"},
@@ -60,21 +55,21 @@ TEST_F(ModelRunTest, WhatAModelMayDoWrongIsAFailedEvaluationWithItsReason) {
   description_.measures[0].statisticType = StatisticType::rootMeanSquare;  // squares 1e30 in 32 bits
   makeRunner(launcher_, 1);
   batch_.output = {"last words"};
-  for (const auto& c : cases) {
+  for (const auto& [name, content, kind, reason] : cases) {
     batch_.write = nullptr;
-    if (c.content != "-") writes("simulated.csv", c.content);
-    if (c.kind == Kind::signal) batch_.failure = {BatchFailure::Kind::signal, 11, "why"};
+    if (content != "-") writes("simulated.csv", content);
+    if (kind == Kind::signal) batch_.failure = {BatchFailure::Kind::signal, 11, "why"};
     const EvaluationResult result = evaluate(2.0);
     batch_.failure = {};
-    ASSERT_FALSE(result.ok()) << c.name;
-    EXPECT_EQ(result.failure->kind, c.kind) << c.name;
-    EXPECT_THAT(result.failure->reason, testing::StartsWith(c.reason)) << c.name;
+    ASSERT_FALSE(result.ok()) << name;
+    EXPECT_EQ(result.failure->kind, kind) << name;
+    EXPECT_THAT(result.failure->reason, StartsWith(reason)) << name;
     EXPECT_THAT(result.failure->lastOutput, ElementsAre("last words"));
-    EXPECT_THAT(result.measureValues, ElementsAre(kFailedRunValue)) << c.name;
-    EXPECT_THAT(result.objectiveValues, ElementsAre(kFailedRunValue)) << c.name;
+    EXPECT_THAT(result.measureValues, ElementsAre(kFailedRunValue)) << name;
+    EXPECT_THAT(result.objectiveValues, ElementsAre(kFailedRunValue)) << name;
     // A good run in the same slot follows; then the next case must not find its results.
     writes("simulated.csv", series(4.0));
-    EXPECT_THAT(evaluate(2.0).measureValues, ElementsAre(3.0)) << c.name;
+    EXPECT_THAT(evaluate(2.0).measureValues, ElementsAre(3.0)) << name;
   }
 }
 
@@ -97,7 +92,7 @@ TEST_F(ModelRunTest, MeasureFileValuesAreTakenByTheirNumber) {
       EXPECT_THAT(result.measureValues, ElementsAre(8.5));
     } else {
       EXPECT_EQ(result.failure->kind, Kind::resultsNotReadable);
-      EXPECT_THAT(result.failure->reason, testing::StartsWith(reason));
+      EXPECT_THAT(result.failure->reason, StartsWith(reason));
     }
   }
   batch_.write = nullptr;
@@ -109,8 +104,8 @@ TEST_F(ModelRunTest, MeasuresThatCannotBeComputedEndTheRunNamingTheSlotsFile) {
   makeRunner(launcher_, 1);
   writes("simulated.csv", series(4.0));
   EXPECT_THAT(refusalOf([this] { evaluate(2.0); }),
-              AllOf(testing::StartsWith("Error: No simulated data found at observation times for item No. 1 in " +
-                                        folder_ / "base/simulated.csv" + "\n"),
+              AllOf(StartsWith("Error: No simulated data found at observation times for item No. 1 in " +
+                               folder_ / "base/simulated.csv" + "\n"),
                     HasSubstr("read from " + folder_ / "run_Process1/simulated.csv")));
 }
 
@@ -154,7 +149,7 @@ TEST_F(ModelRunTest, ARunThatMeetsFewerObservationsThanAnyBeforeIsNamedInAWarnin
     ledger.finish(*ledger.takeNext(), result);
     last = observer_.events.front();
     EXPECT_EQ(last.starts_with("warning: "), *warning != '\0') << last;
-    EXPECT_THAT(last, testing::HasSubstr(warning));
+    EXPECT_THAT(last, HasSubstr(warning));
   }
   EXPECT_EQ(last,
             "warning: Evaluation of parameter set No. 6: output measure \"bias\": 4 of 5 observations in the "
@@ -169,7 +164,7 @@ TEST_F(ModelRunTest, SavedFilesAreThoseThatTheRunWrote) {
   description_.savedFolder = folder_ / "run_Saved";
   makeRunner(launcher_, 1);
   const auto notKept = [this](const std::string& name) {
-    return testing::StartsWith((folder_ / "run_Process1") + "/" + name + " was not kept: ");
+    return StartsWith((folder_ / "run_Process1") + "/" + name + " was not kept: ");
   };
   // Before the first run the file is the base folder's copy, before the second the first run's.
   writes("simulated.csv", series(4.0));
@@ -179,7 +174,7 @@ TEST_F(ModelRunTest, SavedFilesAreThoseThatTheRunWrote) {
     EXPECT_THAT(result.warnings, ElementsAre(notKept("out/state.txt"), notKept("none.txt")));
     const std::string folder = fmt::format("run_Saved/{}/", number);
     EXPECT_EQ(folder_.read(folder + "simulated.csv"), series(4.0));
-    EXPECT_THAT(folder_.read(folder + "parameters.txt"), testing::EndsWith(fmt::format(" {}\n", 2 + number)));
+    EXPECT_THAT(folder_.read(folder + "parameters.txt"), EndsWith(fmt::format(" {}\n", 2 + number)));
     EXPECT_FALSE(folder_.exists(folder + "out/state.txt"));
   }
   writes("out/state.txt", "by the run");
@@ -195,8 +190,8 @@ TEST_F(ModelRunTest, SavedFilesAreThoseThatTheRunWrote) {
   std::filesystem::rename(folder_ / "run_Saved", folder_ / "other");
   folder_.write("run_Saved", "");
   runner_->keepOutputFiles(1, 9, result);
-  EXPECT_THAT(result.warnings, testing::Contains((folder_ / "run_Process1/simulated.csv") +
-                                                 " was not kept: " + (folder_ / "run_Saved/9") + ": Not a directory"));
+  EXPECT_THAT(result.warnings, Contains((folder_ / "run_Process1/simulated.csv") +
+                                        " was not kept: " + (folder_ / "run_Saved/9") + ": Not a directory"));
 }
 
 TEST_F(ModelRunTest, NumericIdTemplatesAreConvertedIntoTheSlotsAlone) {
@@ -252,7 +247,7 @@ TEST_F(ModelRunTest, WhatCannotWorkIsRefusedBeforeAModelRuns) {
                            " does not lie in the model's folder\n" + lie);
   description_ = good;
   description_.measures[0].observation.fileName = folder_ / "missing.csv";
-  EXPECT_THAT(refusal(), testing::StartsWith("Error opening TS object for file: " + (folder_ / "missing.csv")));
+  EXPECT_THAT(refusal(), StartsWith("Error opening TS object for file: " + (folder_ / "missing.csv")));
   EXPECT_FALSE(folder_.exists("run_Process1"));
   description_ = good;
   launcher_.initialiseError = "Unable to create the folder /x: Permission denied";

@@ -4,6 +4,7 @@
 #include <sched.h>
 #include <sys/mount.h>
 #include <sys/statfs.h>
+#include <tuple>
 
 #include "faults/fault_report.h"
 #include "faults/faulty_run.h"
@@ -197,22 +198,19 @@ void tryFullDisk(bool isLong, FaultReport& report) {
 
 /// The model itself removes, in its third run, what the program works with.
 void tryRemovedFiles(FaultReport& report) {
-  struct Case {
-    const char* removed;
-    const char* named;  ///< the message names it; null: the run does not need it any more
-    const char* reason;
-  };
-  constexpr Case kCases[] = {{"model", nullptr, ""},
-                             {"observed.csv", nullptr, ""},
-                             {"basin.kdx", nullptr, ""},
-                             {"basin._spi_", nullptr, ""},
-                             {"basin_Saved", nullptr, ""},
-                             {"basin_Process1", "basin_Process1/simulated.csv", ""},
-                             {"basin_Process1/parameters.txt", "basin_Process1/parameters.txt", "No such file"},
-                             {"basin_Process1/run.sh", "run.sh", "No such file or directory"},
-                             {"basin_Optimisation.dat", nullptr, ""},
-                             {"basin.log", nullptr, ""}};
-  for (const Case& removal : kCases) {
+  // named: the message names it; null: the run does not need it any more
+  constexpr std::tuple<const char*, const char*, const char*> kCases[] = {
+      {"model", nullptr, ""},
+      {"observed.csv", nullptr, ""},
+      {"basin.kdx", nullptr, ""},
+      {"basin._spi_", nullptr, ""},
+      {"basin_Saved", nullptr, ""},
+      {"basin_Process1", "basin_Process1/simulated.csv", ""},
+      {"basin_Process1/parameters.txt", "basin_Process1/parameters.txt", "No such file"},
+      {"basin_Process1/run.sh", "run.sh", "No such file or directory"},
+      {"basin_Optimisation.dat", nullptr, ""},
+      {"basin.log", nullptr, ""}};
+  for (const auto& [removed, named, reason] : kCases) {
     const TemporaryFolder outside;
     FaultyRun run(RunSettings{.option = 2, .maxEvaluations = 6},
                   fmt::format("echo >>{1}/count\n{0} \"$@\" || exit 1\n"
@@ -221,18 +219,18 @@ void tryRemovedFiles(FaultReport& report) {
                               MIREVO_TEST_MODEL, outside.path()));
     run.makeReference();
     fs::remove(outside / "count");
-    outside.write("armed", run.folder() / removal.removed);
+    outside.write("armed", run.folder() / removed);
     run.reset();
     const ProgramResult result = run.run({});
-    Expectation expected{.reason = removal.reason, .mayPassSilently = removal.named == nullptr};
-    if (removal.named != nullptr) expected.names = {removal.named};
+    Expectation expected{.reason = reason, .mayPassSilently = named == nullptr};
+    if (named != nullptr) expected.names = {named};
     expected.mayFailEvaluation = true;
     auto problems = run.check(result, expected);
-    if (result.exitCode != (removal.named == nullptr ? 0 : 1)) {
+    if (result.exitCode != (named == nullptr ? 0 : 1)) {
       problems.push_back(fmt::format("exit code {}", result.exitCode));
     }
     if (run.folder().read("basin.log").find("Setup file:") == std::string::npos) problems.push_back("the log is lost");
-    report.tried("files removed during the run", removal.removed, problems);
+    report.tried("files removed during the run", removed, problems);
   }
 }
 

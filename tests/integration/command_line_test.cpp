@@ -2,12 +2,10 @@
 #include <gtest/gtest.h>
 
 #include "integration/model_folder.h"
+#include "matchers.h"
 
 namespace mirevo::testing {
 namespace {
-
-using ::testing::HasSubstr;
-using ::testing::StartsWith;
 
 TEST(CommandLine, WithoutASetupFileTheUsageIsShown) {
   const ProgramResult result = runProgram({"//QMON", "a.kdx", " "});

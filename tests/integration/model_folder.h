@@ -117,25 +117,4 @@ inline std::string withoutDates(const std::string& results) {
   return kept;
 }
 
-/// The rows of a result file, each split at its tabs, the header row first; and its `#` lines.
-struct ResultTable {
-  std::vector<std::vector<std::string>> rows;
-  std::vector<std::string> comments;
-};
-
-inline ResultTable readResults(const std::string& text) {
-  ResultTable table;
-  std::istringstream lines(text);
-  for (std::string line; std::getline(lines, line);) {
-    if (line.starts_with("#")) {
-      table.comments.push_back(line);
-      continue;
-    }
-    table.rows.emplace_back();
-    std::istringstream cells(line);
-    for (std::string cell; std::getline(cells, cell, '\t');) table.rows.back().push_back(cell);
-  }
-  return table;
-}
-
 }  // namespace mirevo::testing

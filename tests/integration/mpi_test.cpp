@@ -1,17 +1,18 @@
 #include <algorithm>
+#include <tuple>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "common/data_table.h"
 #include "integration/model_folder.h"
 #include "integration/mpi_job.h"
+#include "matchers.h"
 
 namespace mirevo::testing {
 namespace {
 
 using ::testing::AnyOf;
-using ::testing::HasSubstr;
-using ::testing::Not;
 
 /// A model that uses MPI itself must not take itself for a process of this job.
 constexpr char kCountsJobVariables[] = "env | grep -cE '^(OMPI|PMIX|PMI)_' > job_variables.txt";
@@ -75,7 +76,7 @@ TEST_F(Mpi, AJobWritesTheResultsOfAPlainRun) {
     EXPECT_EQ(occurrences(log(), "NoSimultaneousSim: taken as 1 on each worker"), c.jobSlots > 1 ? 1 : 0);
     EXPECT_EQ(folder_.read("basin_Series.dat"), series);
     EXPECT_THAT(log(), HasSubstr(fmt::format("MPI job: this master and {} workers", c.processes - 1)));
-    EXPECT_THAT(log(), ::testing::EndsWith("\n\nNormal termination\n"));
+    EXPECT_THAT(log(), EndsWith("\n\nNormal termination\n"));
     for (int rank = 1; rank < c.processes; ++rank) {
       EXPECT_EQ(folder_.read(processFolder(c.settings, rank) + "/job_variables.txt"), "0\n");
     }
@@ -84,7 +85,7 @@ TEST_F(Mpi, AJobWritesTheResultsOfAPlainRun) {
       EXPECT_TRUE(folder_.exists("basin_Saved/15/simulated.csv"));
       EXPECT_EQ(folder_.read("basin_Saved/15/simulated.csv"), folder_.read("basin_Saved.1/15/simulated.csv"));
     }
-    EXPECT_THAT(folder_.read("basin._spi_"), ::testing::EndsWith("PROGRE100.0\n"));
+    EXPECT_THAT(folder_.read("basin._spi_"), EndsWith("PROGRE100.0\n"));
   }
 }
 
@@ -129,14 +130,7 @@ TEST_F(Mpi, AProcessAloneInItsJobIsAPlainRun) {
 }
 
 TEST_F(Mpi, AnErrorEndsTheJobWithItsMessageOnce) {
-  struct Case {
-    const char* what;
-    std::string script;
-    RunSettings settings;
-    std::string message;
-    std::string detail;
-  };
-  const std::vector<Case> cases = {
+  const std::vector<std::tuple<const char*, std::string, RunSettings, std::string, std::string>> cases = {
       {"too many model runs fail",
        "",
        {.option = 0, .scenarios = scenarios(8), .modelArguments = "--fail-above -1"},
@@ -150,16 +144,16 @@ TEST_F(Mpi, AnErrorEndsTheJobWithItsMessageOnce) {
        "reported by worker "},
       {"the setup has no model", "", {.option = 0, .batchFile = "model/none.sh"}, "Error: The file ", "none.sh"},
   };
-  for (const Case& c : cases) {
-    SCOPED_TRACE(c.what);
-    folder_.useScript(c.script);
-    const ProgramResult job = runJob(3, {folder_.writeSetup(c.settings)});
+  for (const auto& [what, script, settings, message, detail] : cases) {
+    SCOPED_TRACE(what);
+    folder_.useScript(script);
+    const ProgramResult job = runJob(3, {folder_.writeSetup(settings)});
     EXPECT_EQ(job.exitCode, 1);
     EXPECT_FALSE(job.timedOut);
-    EXPECT_THAT(log(), HasSubstr(c.message));
-    EXPECT_THAT(log(), HasSubstr(c.detail));
+    EXPECT_THAT(log(), HasSubstr(message));
+    EXPECT_THAT(log(), HasSubstr(detail));
     EXPECT_THAT(log(), Not(HasSubstr("Termination request")));
-    EXPECT_EQ(occurrences(job.error, c.message), 1) << job.error;
+    EXPECT_EQ(occurrences(job.error, message), 1) << job.error;
   }
   EXPECT_EQ(occurrences(runJob(3, {"//qmon"}).error, "Usage: Mirevo kdx-file"), 1);
 }
@@ -189,7 +183,7 @@ TEST_F(Mpi, HoweverAJobIsEndedItLeavesNoProcess) {
     const char* const message = way == Way::killFile ? "EM: Simulation cancelled" : "Termination request";
     EXPECT_THAT(log(), HasSubstr(fmt::format("\n{}\n", message)));
     EXPECT_THAT(folder_.read("basin.dat"), HasSubstr(fmt::format("# {}\n", message)));
-    EXPECT_EQ(readResults(folder_.read("basin.dat")).rows.size(), 12U);
+    EXPECT_EQ(readDataTable(folder_.read("basin.dat")).rows.size(), 11U);
     EXPECT_THAT(result.error, HasSubstr(way == Way::killedWorker ? "signal 9" : message));
     for (const int process : processes) EXPECT_TRUE(waitUntil([&] { return !isRunning(process); })) << process;
     for (const char* name : pidFiles) std::filesystem::remove(folder_ / name);

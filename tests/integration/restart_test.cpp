@@ -3,16 +3,15 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "common/data_table.h"
 #include "integration/model_folder.h"
 #include "integration/mpi_job.h"
+#include "matchers.h"
 
 // What a run leaves that is killed at any call, or whose result file is cut, and how the next one goes on from there,
 // is tried by the program `faults`.
 namespace mirevo::testing {
 namespace {
-
-using ::testing::HasSubstr;
-using ::testing::Not;
 
 class Restart : public ::testing::Test {
  protected:
@@ -58,7 +57,7 @@ fi)");
       std::filesystem::create_directory(folder_ / "tickets");
       RunningProgram program = processes == 0 ? RunningProgram({setup_}) : startJob(processes, {setup_});
       const auto rows = processes == 0 ? 12 : 24;
-      ASSERT_TRUE(waitUntil([&] { return std::ssize(readResults(folder_.read(resultFile_)).rows) == 1 + rows; }));
+      ASSERT_TRUE(waitUntil([&] { return std::ssize(readDataTable(folder_.read(resultFile_)).rows) == rows; }));
       const std::string progress = folder_.read("basin._spi_");
       ::kill(std::atoi(progress.c_str() + progress.find(", process ") + 10), SIGKILL);  // the master
       program.wait();
@@ -134,13 +133,13 @@ TEST_F(Restart, GoesOnThoughAnotherTaskWasRunInBetween) {
 TEST_F(Restart, ARaisedBudgetIsANewSearchOfDds) {
   writeSetup({.includesInitial = false, .maxEvaluations = 20});
   run();
-  const auto first = readResults(results()).rows;
+  const auto first = readDataTable(results()).rows;
   folder_.editSetup("Max_No_Evaluations = 20", "Max_No_Evaluations = 50");
   run();
   EXPECT_THAT(log(), HasSubstr("a new search starts from the best of the first 20 evaluations, which are kept"));
   const std::string expected = results();
-  const auto rows = readResults(expected).rows;
-  ASSERT_EQ(rows.size(), 52U);  // header, 50 and the final run
+  const auto rows = readDataTable(expected).rows;
+  ASSERT_EQ(rows.size(), 51U);  // 50 and the final run
   EXPECT_TRUE(std::equal(first.begin(), first.end(), rows.begin()));
   // Cut off in the second search, it goes on in the second search.
   folder_.write(resultFile_, expected.substr(0, expected.find("\n37\t") + 5));
@@ -168,7 +167,7 @@ TEST_F(Restart, FailuresThatEndedARunAreMadeAgainWhenAsked) {
   EXPECT_THAT(log(), HasSubstr(why));
   folder_.editSetup("Restart = 1", "Restart = 2");
   run();
-  EXPECT_EQ(readResults(results()).rows.size(), 31U);
+  EXPECT_EQ(readDataTable(results()).rows.size(), 30U);
   EXPECT_THAT(results(), Not(HasSubstr("FAILED")));
   EXPECT_EQ(folder_.read("calSimErr.dat"), "# Failed evaluations of basin\n");
   EXPECT_FALSE(folder_.exists("basin_Failed1"));

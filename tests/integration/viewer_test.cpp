@@ -3,12 +3,10 @@
 
 #include "integration/model_folder.h"
 #include "integration/pseudo_terminal.h"
+#include "matchers.h"
 
 namespace mirevo::testing {
 namespace {
-
-using ::testing::HasSubstr;
-using ::testing::Not;
 
 /// A run of this process, as its message file tells it.
 std::string runningRun() {
@@ -190,7 +188,7 @@ TEST_F(ViewerTest, WithoutATerminalTheMessagesComeAsLines) {
   const ProgramResult result = runProgram({"//qmon", folder_.writeSetup({.maxEvaluations = 3})});
   EXPECT_EQ(result.exitCode, 0);
   EXPECT_THAT(result.output, HasSubstr("\nEvaluation of parameter set No. 2 completed: OK\nBest so far: "));
-  EXPECT_THAT(result.output, ::testing::EndsWith("-- Normal termination\n"));
+  EXPECT_THAT(result.output, EndsWith("-- Normal termination\n"));
   EXPECT_THAT(result.output, Not(HasSubstr("\x1b")));
 
   TerminalProgram dumb(attached(), {{"TERM", "dumb"}});

@@ -5,22 +5,18 @@
 #include <cmath>
 #include <cstdint>
 #include <functional>
+#include <tuple>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "matchers.h"
 #include "platform/series/csv_time_series.h"
 #include "platform/series/memory_time_series.h"
 #include "refusal.h"
 
 namespace mirevo {
 namespace {
-
-using ::testing::AllOf;
-using ::testing::ElementsAre;
-using ::testing::HasSubstr;
-using ::testing::IsEmpty;
-using ::testing::StartsWith;
 
 constexpr float kGap = -99.0F;
 const EvaluationPeriod kJanuary{{2001, 1, 1}, {2001, 1, 31}};
@@ -85,43 +81,26 @@ TEST(MeasureStatistics, AreTheSameBitsAsEver) {
 }
 
 TEST(MeasureStatistics, UsesTheObservationsThatCount) {
-  const float nan = std::nanf("");
-  struct Case {
-    const char* name;
-    std::vector<float> simulated, observed;
-    DateRecord simulationStart;
-    EvaluationPeriod period;
-    std::vector<float> used;
-    std::vector<double> times;  // of these, in days since the simulation's start
-  };
-  const Case cases[] = {
-      {"both ends of the period",
-       {1, 2, 3, 4, 5},
-       {0, 0, 0, 0, 0},
-       {2001, 1, 1},
-       {{2001, 1, 2}, {2001, 1, 4}},
-       {2, 3, 4},
-       {1, 2, 3}},
-      {"a period that ends at 24:00",
-       {1, 2, 3},
-       {0, 0, 0},
-       {2001, 1, 1},
-       {{2001, 1, 1}, {2001, 1, 1, 24, 0}},
-       {1, 2},
-       {0, 1}},
-      {"missing observations", {1, 2, 3}, {kGap, nan, 0}, {2001, 1, 1}, kJanuary, {3}, {2}},
-      {"missing simulated values", {1, kGap, 3}, {0, 0, 0}, {2001, 1, 1}, kJanuary, {1, 3}, {0, 2}},
-      {"a simulation that starts later", {5, 6}, {0, 0, 0, 0}, {2001, 1, 2}, kJanuary, {5, 6}, {0, 1}},
-      {"a simulation that starts in between", {5, 7}, {0, 0, 0}, {2000, 12, 31, 12, 0}, kJanuary, {6}, {0.5}},
-  };
-  for (const Case& c : cases) {
-    SCOPED_TRACE(c.name);
-    MemoryTimeSeries simulation = daily(c.simulated, c.simulationStart);
-    MemoryTimeSeries observation = daily(c.observed);
-    const MeasureStatistics s =
-        computeMeasureStatistics(measure(), c.period, simulation, observation, 1.0F, 1.0F, false);
-    EXPECT_EQ(s.simulatedValues, c.used);
-    EXPECT_EQ(s.times, c.times);
+  const DateRecord first{2001, 1, 1};
+  const EvaluationPeriod middle{{2001, 1, 2}, {2001, 1, 4}};
+  const EvaluationPeriod firstDay{first, {2001, 1, 1, 24, 0}};
+  using Values = std::vector<float>;
+  // The simulated values from their start on and the observed ones, the period, the simulated values that count, and
+  // their times in days since the simulation's start.
+  const std::tuple<const char*, Values, DateRecord, Values, EvaluationPeriod, Values, std::vector<double>> cases[] = {
+      {"both ends of the period", {1, 2, 3, 4, 5}, first, {0, 0, 0, 0, 0}, middle, {2, 3, 4}, {1, 2, 3}},
+      {"a period that ends at 24:00", {1, 2, 3}, first, {0, 0, 0}, firstDay, {1, 2}, {0, 1}},
+      {"missing observations", {1, 2, 3}, first, {kGap, NAN, 0}, kJanuary, {3}, {2}},
+      {"missing simulated values", {1, kGap, 3}, first, {0, 0, 0}, kJanuary, {1, 3}, {0, 2}},
+      {"a simulation that starts later", {5, 6}, {2001, 1, 2}, {0, 0, 0, 0}, kJanuary, {5, 6}, {0, 1}},
+      {"a simulation that starts in between", {5, 7}, {2000, 12, 31, 12}, {0, 0, 0}, kJanuary, {6}, {0.5}}};
+  for (const auto& [name, simulated, start, observed, period, used, times] : cases) {
+    SCOPED_TRACE(name);
+    MemoryTimeSeries simulation = daily(simulated, start);
+    MemoryTimeSeries observation = daily(observed);
+    const MeasureStatistics s = computeMeasureStatistics(measure(), period, simulation, observation, 1.0F, 1.0F, false);
+    EXPECT_EQ(s.simulatedValues, used);
+    EXPECT_EQ(s.times, times);
     EXPECT_EQ(s.peakDifference, 0.0F);
   }
 }
@@ -150,11 +129,6 @@ TEST(MeasureStatistics, AxesThatStartAtDifferentTimesMeetWithoutRounding) {
 }
 
 TEST(MeasureStatistics, FailuresHaveTheirFixedTextsAndSayMore) {
-  struct Case {
-    const char* message;
-    const char* detail;
-    std::function<void()> call;
-  };
   const auto run = [](int simulationItem, int observationItem, std::vector<float> simulated, EvaluationPeriod period) {
     return [=] {
       MemoryTimeSeries simulation = daily(simulated);
@@ -165,7 +139,7 @@ TEST(MeasureStatistics, FailuresHaveTheirFixedTextsAndSayMore) {
       computeMeasureStatistics(m, period, simulation, observation, 1.0F, 1.0F, true);
     };
   };
-  const Case cases[] = {
+  const std::tuple<const char*, const char*, std::function<void()>> cases[] = {
       {"Error: Item No. 2 not found in /base/sim.csv", "the file has 1 item\n1: item 1", run(2, 1, {1}, kJanuary)},
       {"Error: Item No. 0 not found in /base/obs.csv", "the file has 1 item", run(1, 0, {1}, kJanuary)},
       {"Error getting time properties of TS object of file /base/sim.csv", "no time step", run(1, 1, {}, kJanuary)},
@@ -176,8 +150,8 @@ TEST(MeasureStatistics, FailuresHaveTheirFixedTextsAndSayMore) {
       {"Error: No simulated data found at observation times for item No. 1 in /base/sim.csv", "",
        run(1, 1, {kGap, kGap}, kJanuary)},
   };
-  for (const Case& c : cases) {
-    EXPECT_THAT(refusalOf(c.call), AllOf(StartsWith(c.message + std::string("\n")), HasSubstr(c.detail)));
+  for (const auto& [message, detail, call] : cases) {
+    EXPECT_THAT(refusalOf(call), AllOf(StartsWith(message + std::string("\n")), HasSubstr(detail)));
   }
 }
 

@@ -1,20 +1,16 @@
 #include "measures/objective_functions.h"
 
 #include <cmath>
+#include <tuple>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "matchers.h"
 #include "refusal.h"
 
 namespace mirevo {
 namespace {
-
-using ::testing::AllOf;
-using ::testing::DoubleNear;
-using ::testing::ElementsAre;
-using ::testing::HasSubstr;
-using ::testing::StartsWith;
 
 ObjectiveFunction function(std::string name, FunctionType type, std::vector<std::size_t> measures) {
   ObjectiveFunction f;
@@ -36,31 +32,28 @@ TEST(ObjectiveFunctions, CombineTheirMeasuresByType) {
 }
 
 TEST(ObjectiveFunctions, AggregateByMethod) {
-  struct Case {
-    std::vector<double> values, weights, sigma, mu;
-    AggregationMethod method;
-    double expected;
-  };
   const double phiOfOne = 0.8413447460685429;  // standard normal distribution at 1, as tabulated
-  const Case cases[] = {
-      {{2, 3}, {1, 0.5}, {}, {}, AggregationMethod::none, 3.5},
-      {{4}, {1}, {2}, {1}, AggregationMethod::commonDistance, 3.0},
-      {{4, 6}, {1, 2}, {2, 3}, {1, -1}, AggregationMethod::commonDistance, 5.0},
-      {{7, 7}, {3, 1}, {2, 5}, {7, 7}, AggregationMethod::commonProbability, 2.0},
-      {{5}, {2}, {4}, {1}, AggregationMethod::commonProbability, 2 * phiOfOne},
-      {{-3}, {1}, {4}, {1}, AggregationMethod::commonProbability, 1 - phiOfOne},
-      {{7, 7}, {3, 1}, {2, 5}, {7, 7}, AggregationMethod::zero, 0.0},
-      {{7}, {3}, {2}, {7}, static_cast<AggregationMethod>(9), 0.0},
-      {{}, {}, {}, {}, AggregationMethod::none, 0.0},
-      {{}, {}, {}, {}, AggregationMethod::commonProbability, 0.0},
-      {{3}, {1}, {0}, {1}, AggregationMethod::commonDistance, INFINITY},  // a zero σ is not guarded here
-  };
-  for (const Case& c : cases) {
-    const double aggregate = aggregateObjective(c.values, c.weights, c.sigma, c.mu, c.method);
-    if (std::isinf(c.expected)) {
-      EXPECT_EQ(aggregate, c.expected);
+  const std::tuple<std::vector<double>, std::vector<double>, std::vector<double>, std::vector<double>,
+                   AggregationMethod, double>
+      cases[] = {
+          {{2, 3}, {1, 0.5}, {}, {}, AggregationMethod::none, 3.5},
+          {{4}, {1}, {2}, {1}, AggregationMethod::commonDistance, 3.0},
+          {{4, 6}, {1, 2}, {2, 3}, {1, -1}, AggregationMethod::commonDistance, 5.0},
+          {{7, 7}, {3, 1}, {2, 5}, {7, 7}, AggregationMethod::commonProbability, 2.0},
+          {{5}, {2}, {4}, {1}, AggregationMethod::commonProbability, 2 * phiOfOne},
+          {{-3}, {1}, {4}, {1}, AggregationMethod::commonProbability, 1 - phiOfOne},
+          {{7, 7}, {3, 1}, {2, 5}, {7, 7}, AggregationMethod::zero, 0.0},
+          {{7}, {3}, {2}, {7}, static_cast<AggregationMethod>(9), 0.0},
+          {{}, {}, {}, {}, AggregationMethod::none, 0.0},
+          {{}, {}, {}, {}, AggregationMethod::commonProbability, 0.0},
+          {{3}, {1}, {0}, {1}, AggregationMethod::commonDistance, INFINITY},  // a zero σ is not guarded here
+      };
+  for (const auto& [values, weights, sigma, mu, method, expected] : cases) {
+    const double aggregate = aggregateObjective(values, weights, sigma, mu, method);
+    if (std::isinf(expected)) {
+      EXPECT_EQ(aggregate, expected);
     } else {
-      EXPECT_NEAR(aggregate, c.expected, 1e-15);
+      EXPECT_NEAR(aggregate, expected, 1e-15);
     }
   }
 }

@@ -1,47 +1,41 @@
 #include "measures/period_series.h"
 
 #include <cmath>
-#include <limits>
+#include <utility>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include "common/calendar.h"
+#include "matchers.h"
 #include "platform/series/memory_time_series.h"
 
 namespace mirevo {
 namespace {
 
-using ::testing::ElementsAre;
-using ::testing::NanSensitiveFloatEq;
-
-constexpr float kNaN = std::numeric_limits<float>::quiet_NaN();
-
 TEST(PeriodSeries, HasTheStepsOfThePeriodAndOneOnEitherSide) {
   const std::int64_t day = secondNumber({2001, 1, 1});
   MemoryTimeSeries series({2001, 1, 1}, {0, 1, 2, 3, 4, 5}, {{9, 9, 9, 9, 9, 9}, {10, 11, 12, -99, 14, 15}}, -99.0F);
-  const struct {
-    EvaluationPeriod period;
-    std::vector<std::int64_t> days;
-  } cases[] = {{{{2001, 1, 2, 12}, {2001, 1, 4, 12}}, {1, 2, 3, 4}},
-               {{{2001, 1, 2}, {2001, 1, 3}}, {1, 2}},
-               {{{1999, 1, 1}, {2000, 1, 1}}, {0}},
-               {{{2002, 1, 1}, {2003, 1, 1}}, {5}},
-               {{{1999, 1, 1}, {2003, 1, 1}}, {0, 1, 2, 3, 4, 5}}};
-  for (const auto& c : cases) {
-    const PeriodSeries read = readPeriodSeries(series, {"s.csv", 2}, c.period);
-    ASSERT_EQ(read.seconds.size(), c.days.size());
-    for (std::size_t i = 0; i < c.days.size(); ++i) {
-      EXPECT_EQ(read.seconds[i], day + 86400 * c.days[i]);
-      const auto expected = c.days[i] == 3 ? kNaN : static_cast<float>(10 + c.days[i]);
+  const std::pair<EvaluationPeriod, std::vector<std::int64_t>> cases[] = {
+      {{{2001, 1, 2, 12}, {2001, 1, 4, 12}}, {1, 2, 3, 4}},
+      {{{2001, 1, 2}, {2001, 1, 3}}, {1, 2}},
+      {{{1999, 1, 1}, {2000, 1, 1}}, {0}},
+      {{{2002, 1, 1}, {2003, 1, 1}}, {5}},
+      {{{1999, 1, 1}, {2003, 1, 1}}, {0, 1, 2, 3, 4, 5}}};
+  for (const auto& [period, days] : cases) {
+    const PeriodSeries read = readPeriodSeries(series, {"s.csv", 2}, period);
+    ASSERT_EQ(read.seconds.size(), days.size());
+    for (std::size_t i = 0; i < days.size(); ++i) {
+      EXPECT_EQ(read.seconds[i], day + 86400 * days[i]);
+      const auto expected = days[i] == 3 ? NAN : static_cast<float>(10 + days[i]);
       EXPECT_THAT(read.values[i], NanSensitiveFloatEq(expected));
     }
   }
 }
 
 TEST(PeriodSeries, ValuesBetweenStepsAreLinearAndNeverBesideAMissingOne) {
-  const PeriodSeries series{{10, 20, 30, 40}, {1.0F, 2.0F, kNaN, 4.0F}};
-  const auto nan = NanSensitiveFloatEq(kNaN);
+  const PeriodSeries series{{10, 20, 30, 40}, {1.0F, 2.0F, NAN, 4.0F}};
+  const auto nan = NanSensitiveFloatEq(NAN);
   const std::vector<std::int64_t> seconds{9, 10, 15, 20, 25, 30, 35, 40, 41};
   EXPECT_THAT(valuesAt(series, seconds), ElementsAre(nan, 1.0F, 1.5F, 2.0F, nan, nan, nan, 4.0F, nan));
 }

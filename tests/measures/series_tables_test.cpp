@@ -1,18 +1,17 @@
 #include "measures/series_tables.h"
 
+#include <tuple>
+#include <utility>
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "matchers.h"
 #include "refusal.h"
 #include "temporary_folder.h"
 
 namespace mirevo {
 namespace {
-
-using ::testing::AllOf;
-using ::testing::ElementsAre;
-using ::testing::HasSubstr;
-using ::testing::StartsWith;
 
 const EvaluationPeriod kPeriod{{2001, 1, 1}, {2001, 12, 31}};
 
@@ -52,11 +51,7 @@ TEST_F(SeriesTablesTest, MeasuresShareTheFilesTheyNameAlike) {
 TEST_F(SeriesTablesTest, SetupFailuresEndTheRun) {
   folder_.write("bad.csv", "time,Q\n2001-01-01,1,2\n");
   folder_.write("text.csv", "time,Q\n2001-01-01,bad\n");
-  const struct {
-    OutputMeasure measure;
-    std::string message;
-    std::string detail;
-  } cases[] = {
+  const std::tuple<OutputMeasure, std::string, std::string> cases[] = {
       {measure("gone.csv", "obs.csv"), "Error opening TS object for file: " + folder_ / "gone.csv",
        folder_ / "gone.csv" + ": No such file or directory"},
       {measure("sim.csv", "gone.csv "), "Error opening TS object for file: " + folder_ / "gone.csv", "No such file"},
@@ -66,19 +61,16 @@ TEST_F(SeriesTablesTest, SetupFailuresEndTheRun) {
        "the file has 2 items\n1: Q\n2: H"},
       {measure("sim.csv", "text.csv"), "Error getting data of TS item in " + folder_ / "text.csv", "text.csv:2:12:"},
   };
-  for (const auto& c : cases) {
-    EXPECT_THAT(refusalOf([&] { SeriesTables::MirevoTSobjectInit(std::vector{c.measure}, kPeriod); }),
-                AllOf(StartsWith(c.message + "\n"), HasSubstr(c.detail)));
+  for (const auto& [measure, message, detail] : cases) {
+    EXPECT_THAT(refusalOf([&] { SeriesTables::MirevoTSobjectInit(std::vector{measure}, kPeriod); }),
+                AllOf(StartsWith(message + "\n"), HasSubstr(detail)));
   }
 }
 
 TEST_F(SeriesTablesTest, UnusableResultsOfARunAreAReasonAndNoError) {
   SeriesTables tables = SeriesTables::MirevoTSobjectInit(std::vector{measure("sim.csv", "obs.csv", 2)}, kPeriod);
-  struct Case {
-    const char* content;
-    std::string reason;  // empty: usable
-  };
-  const Case cases[] = {
+  // expected: the reason why it is of no use; empty: it is
+  const std::pair<const char*, std::string> cases[] = {
       {"time,Q,H\n2001-01-01,,5\n", ""},
       {"time,Q,H\n2001-01-01,A:e,5\n", ""},  // a column that no measure reads
       {"time,Q,H\n", ": expected at least one time step, found none"},
@@ -89,12 +81,12 @@ TEST_F(SeriesTablesTest, UnusableResultsOfARunAreAReasonAndNoError) {
       {"time,Q,H\n2001-01-01,1,2\n2001-01", ":3:1: expected a valid time"},
       {"time,Q,H\n2001-01-01,1,6\n", ""},
   };
-  for (const Case& c : cases) {
-    folder_.write("slot.csv", c.content);
+  for (const auto& [content, expected] : cases) {
+    folder_.write("slot.csv", content);
     const auto reason = tables.tryOpenSimulationFiles(std::vector{(folder_ / "slot.csv")});
-    ASSERT_EQ(reason.has_value(), !c.reason.empty()) << c.content << reason.value_or("");
+    ASSERT_EQ(reason.has_value(), !expected.empty()) << content << reason.value_or("");
     if (reason) {
-      EXPECT_THAT(*reason, HasSubstr((folder_ / "slot.csv") + c.reason));
+      EXPECT_THAT(*reason, HasSubstr((folder_ / "slot.csv") + expected));
       EXPECT_EQ(reason->find('\n'), std::string::npos);
     } else {
       EXPECT_EQ(tables.simulation(0).timeStepCount(), 1);

@@ -7,16 +7,12 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "matchers.h"
 #include "parameters/dependency_order.h"
 #include "refusal.h"
 
 namespace mirevo {
 namespace {
-
-using ::testing::AllOf;
-using ::testing::ElementsAre;
-using ::testing::HasSubstr;
-using ::testing::StartsWith;
 
 ModelParameter variable(std::string name, double initial = 1, double lower = 0, double upper = 10) {
   ModelParameter parameter;

@@ -30,13 +30,7 @@ TEST(TransformParameterValue, FollowsItsTable) {
   constexpr auto kBackward = TransformDirection::backward;
   constexpr auto kInteger = TransformationType::integer;
   constexpr auto kLog = TransformationType::logarithmic;
-  const struct {
-    double value, lower;
-    TransformationType type;
-    TransformDirection direction;
-    double expected;
-    bool failed;
-  } cases[] = {
+  const std::tuple<double, double, TransformationType, TransformDirection, double, bool> cases[] = {
       {0.1, 7, TransformationType::none, kForward, 0.1, false},
       {-5e-324, 7, TransformationType::none, kBackward, -5e-324, false},
       {5.9999, 1, kInteger, kBackward, 5, false},
@@ -53,10 +47,10 @@ TEST(TransformParameterValue, FollowsItsTable) {
       {-1, 1, kLog, kBackward, std::exp(-1.0), false},
       {5, 1, static_cast<TransformationType>(3), kForward, 0, false},
   };
-  for (const auto& c : cases) {
-    bool failed = !c.failed;
-    EXPECT_EQ(TransformParameterValue(c.value, c.lower, c.type, c.direction, failed), c.expected) << c.value;
-    EXPECT_EQ(failed, c.failed) << c.value;
+  for (const auto& [value, lower, type, direction, expected, fails] : cases) {
+    bool failed = !fails;
+    EXPECT_EQ(TransformParameterValue(value, lower, type, direction, failed), expected) << value;
+    EXPECT_EQ(failed, fails) << value;
   }
 }
 

@@ -7,16 +7,12 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "matchers.h"
 #include "refusal.h"
 #include "temporary_folder.h"
 
 namespace mirevo {
 namespace {
-
-using ::testing::AllOf;
-using ::testing::ElementsAre;
-using ::testing::HasSubstr;
-using ::testing::StartsWith;
 
 std::vector<ModelParameter> parameters() {
   const auto make = [](std::string name, double id, double initial, double lower, double upper) {

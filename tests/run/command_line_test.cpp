@@ -1,5 +1,7 @@
 #include "run/command_line.h"
 
+#include <tuple>
+
 #include <gtest/gtest.h>
 
 namespace mirevo {
@@ -8,12 +10,7 @@ namespace {
 TEST(CommandLine, SwitchesAreNotCountedAndTheLastOrdinaryArgumentWins) {
   std::vector<std::string> hundredSwitches(100, "//x");
   hundredSwitches.push_back("late.kdx");
-  const struct {
-    std::vector<std::string> arguments;
-    int count;
-    std::string_view setup;
-    bool viewer;
-  } cases[] = {
+  const std::tuple<std::vector<std::string>, int, std::string_view, bool> cases[] = {
       {{}, 1, "", false},
       {{"a.kdx"}, 2, "a.kdx", false},
       {{"a.kdx", "b.kdx"}, 3, "b.kdx", false},
@@ -27,12 +24,12 @@ TEST(CommandLine, SwitchesAreNotCountedAndTheLastOrdinaryArgumentWins) {
       {{"/"}, 2, "/", false},
       {hundredSwitches, 1, "", false},
   };
-  for (const auto& c : cases) {
-    const CommandLine commandLine(c.arguments);
-    SCOPED_TRACE(c.arguments.empty() ? "no argument" : c.arguments.front());
-    EXPECT_EQ(commandLine.countArguments(), c.count);
-    EXPECT_EQ(commandLine.setupFileName(), c.setup);
-    EXPECT_EQ(commandLine.wantsProgressViewer(), c.viewer);
+  for (const auto& [arguments, count, setup, viewer] : cases) {
+    const CommandLine commandLine(arguments);
+    SCOPED_TRACE(arguments.empty() ? "no argument" : arguments.front());
+    EXPECT_EQ(commandLine.countArguments(), count);
+    EXPECT_EQ(commandLine.setupFileName(), setup);
+    EXPECT_EQ(commandLine.wantsProgressViewer(), viewer);
   }
 }
 

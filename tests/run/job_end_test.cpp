@@ -1,28 +1,20 @@
 #include "run/job_end.h"
 
+#include <tuple>
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include "common/fatal_error.h"
 #include "evaluation/fake_job.h"
+#include "matchers.h"
 #include "temporary_folder.h"
 
 namespace mirevo {
 namespace {
 
-using testing::HasSubstr;
-using testing::IsEmpty;
-
 TEST(JobEnd, TheMasterLeavesOrAbortsItsJob) {
-  const struct {
-    const char* what;
-    int exitCode;
-    int farewells;
-    bool isBroken;
-    bool leaves;
-    bool warnsOfLateError;
-    std::string said;
-  } cases[] = {
+  const std::tuple<const char*, int, int, bool, bool, bool, std::string> cases[] = {
       {"all workers answer", 0, 2, false, true, true, "Warning: Worker 2 met an error that no evaluation depended on"},
       {"after an error of the run", 1, 2, false, true, false, ""},
       {"a worker is silent", 0, 1, false, false, true,
@@ -30,8 +22,8 @@ TEST(JobEnd, TheMasterLeavesOrAbortsItsJob) {
       {"the way to them is broken", 1, 2, true, false, false,
        "Warning: All processes of the MPI job are aborted: Error: MPI communication failed\nwhy"},
   };
-  for (const auto& c : cases) {
-    SCOPED_TRACE(c.what);
+  for (const auto& [what, exitCode, farewells, isBroken, leaves, warnsOfLateError, wanted] : cases) {
+    SCOPED_TRACE(what);
     const TemporaryFolder folder;
     RunState state;
     std::string reason;
@@ -40,22 +32,22 @@ TEST(JobEnd, TheMasterLeavesOrAbortsItsJob) {
     FakeJob& job = *owned;
     state.job = std::move(owned);
     job.deliver(2, RankMessage::failure, encode(FailureMessage{"too late", {}}));
-    for (int rank = 1; rank <= c.farewells; ++rank) job.deliver(rank, RankMessage::farewell, {});
-    if (c.isBroken) job.onReceive = [](double) { fatalError(kCommunicationFailed, "why"); };
+    for (int rank = 1; rank <= farewells; ++rank) job.deliver(rank, RankMessage::farewell, {});
+    if (isBroken) job.onReceive = [](double) { fatalError(kCommunicationFailed, "why"); };
 
     testing::internal::CaptureStderr();
     int abortedWith = -1;
     try {
-      leaveJob(state, c.exitCode, "the end");
+      leaveJob(state, exitCode, "the end");
     } catch (const FakeJob::Aborted& aborted) {
       abortedWith = aborted.exitCode;
     }
     const std::string said = testing::internal::GetCapturedStderr();
-    EXPECT_EQ(job.finalisations, c.leaves ? 1 : 0);
-    EXPECT_EQ(abortedWith, c.leaves ? -1 : c.exitCode);
-    EXPECT_THAT(said, c.said.empty() ? testing::Matcher<std::string>(IsEmpty()) : HasSubstr(c.said));
+    EXPECT_EQ(job.finalisations, leaves ? 1 : 0);
+    EXPECT_EQ(abortedWith, leaves ? -1 : exitCode);
+    EXPECT_THAT(said, wanted.empty() ? testing::Matcher<std::string>(IsEmpty()) : HasSubstr(wanted));
     state.log.close();
-    EXPECT_EQ(folder.read("run.log").find("Worker 2 met an error") != std::string::npos, c.warnsOfLateError);
+    EXPECT_EQ(folder.read("run.log").find("Worker 2 met an error") != std::string::npos, warnsOfLateError);
   }
 }
 

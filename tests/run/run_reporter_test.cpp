@@ -7,12 +7,11 @@
 #include <gtest/gtest.h>
 
 #include "common/text.h"
+#include "matchers.h"
 #include "temporary_folder.h"
 
 namespace mirevo {
 namespace {
-
-using ::testing::HasSubstr;
 
 class RunReporterTest : public ::testing::Test {
  protected:

@@ -8,11 +8,13 @@
 #include <signal.h>
 #include <thread>
 #include <unistd.h>
+#include <utility>
 
 #include <fmt/format.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "matchers.h"
 #include "platform/signals/signal_state.h"
 #include "run/results/run_record.h"
 #include "run/stop_run.h"
@@ -117,18 +119,15 @@ TEST(SignalHandlers, ARequestWaitsForTheEndOfAStepOfTheMainThread) {
 }
 
 TEST(SignalHandlers, FloatingPointSubCodesHaveTheirOwnMessages) {
-  const struct {
-    int signalCode;
-    const char* message;
-  } cases[] = {{FPE_FLTINV, "Floating point exception: Invalid number"},
-               {FPE_FLTDIV, "Floating point exception: Zero divide"},
-               {FPE_INTDIV, "Floating point exception: Zero divide"},
-               {FPE_FLTOVF, "Floating point exception: Overflow"},
-               {FPE_FLTRES, "Floating point exception: Inexact precision"},
-               {FPE_FLTSUB, "Floating point exception: Non-IEEE type"},
-               {SI_USER, "Floating point exception: Non-IEEE type"}};
-  for (const auto& c : cases) {
-    EXPECT_EQ(floatingPointMessage(floatingPointSubCode(c.signalCode)), c.message) << c.signalCode;
+  const std::pair<int, const char*> cases[] = {{FPE_FLTINV, "Floating point exception: Invalid number"},
+                                               {FPE_FLTDIV, "Floating point exception: Zero divide"},
+                                               {FPE_INTDIV, "Floating point exception: Zero divide"},
+                                               {FPE_FLTOVF, "Floating point exception: Overflow"},
+                                               {FPE_FLTRES, "Floating point exception: Inexact precision"},
+                                               {FPE_FLTSUB, "Floating point exception: Non-IEEE type"},
+                                               {SI_USER, "Floating point exception: Non-IEEE type"}};
+  for (const auto& [signalCode, message] : cases) {
+    EXPECT_EQ(floatingPointMessage(floatingPointSubCode(signalCode)), message) << signalCode;
   }
   EXPECT_EQ(floatingPointMessage(fpe::kDenormalized), "Floating point exception: Denormalized number");
 }
@@ -185,7 +184,7 @@ TEST(StopRun, ATerminationLogIsThatOfTheLatestRunAndAnEarlierOneStillWritesItsOw
   EXPECT_EXIT(actWithHandlers(folder, "", "WIN", runTwice), ::testing::ExitedWithCode(0), "");
   EXPECT_EQ(folder.read("a.log"), "Successful completion\n");
   EXPECT_FALSE(folder.exists("b.log"));
-  EXPECT_THAT(openTerminationLog(folder / "no/such/folder/a.log"), ::testing::StartsWith("Unable to open"));
+  EXPECT_THAT(openTerminationLog(folder / "no/such/folder/a.log"), StartsWith("Unable to open"));
 }
 
 }  // namespace

@@ -1,18 +1,17 @@
 #include "viewer/screen_layout.h"
 
 #include <cmath>
+#include <tuple>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "matchers.h"
 #include "viewer/course_plot.h"
 #include "viewer/progress_records.h"
 
 namespace mirevo {
 namespace {
-
-using ::testing::HasSubstr;
-using ::testing::Not;
 
 std::string textOf(const std::vector<ScreenLine>& lines) {
   std::string text;
@@ -35,11 +34,11 @@ ProgressState stateOf(std::string_view furtherRecords = "") {
   return records.state();
 }
 
-ViewerSituation situationOf(RunPresence presence = RunPresence::running) {
+ViewerSituation situationOf(RunPresence presence = RunPresence::running, double now = 1795226410.0) {
   ViewerSituation situation;
   situation.setupName = "basin";
   situation.presence = presence;
-  situation.now = 1795226410.0;
+  situation.now = now;
   return situation;
 }
 
@@ -109,47 +108,36 @@ TEST(ScreenLayout, NoSizeIsTooSmallAndNoLineTooLong) {
 }
 
 TEST(ScreenLayout, WhatBecameOfTheRunIsSaid) {
-  struct Case {
-    std::string records;
-    RunPresence presence;
-    std::vector<std::string> shown;
-    std::vector<std::string> notShown;
-  };
-  const std::vector<Case> cases{
-      {"", RunPresence::running, {" 10.0 %", "Running for"}, {"Ran for"}},
+  using enum RunPresence;
+  // further records, presence, what is shown, what is not
+  const std::tuple<std::string, RunPresence, std::vector<std::string>, std::string> cases[] = {
+      {"", running, {" 10.0 %", "Running for"}, "Ran for"},
       {"STATUSEnded: Normal termination\nPROGRE100.0\n",
-       RunPresence::ended,
+       ended,
        {"  ended\n", "Normal termination", "100.0 %", "Time left    -", "Ran for      2 h"},
-       {"q cancel"}},
-      {"STATUSEnded: Simulation cancelled\nPROGRE100.0\n",
-       RunPresence::ended,
-       {"Simulation cancelled", " 10.0 %"},
-       {"100.0 %"}},
-      {"", RunPresence::vanished, {"  gone\n", "process 77"}, {"q cancel"}},
-      {"MESLBL of 0\n", RunPresence::running, {"4 (0 planned), 1 failed"}, {}},
-      {"MESLBL of 0\nSTATUSEnded: Error: odd\nPROGRE100.0\n", RunPresence::ended, {"    - %", "Error: odd"}, {}},
+       "q cancel"},
+      {"STATUSEnded: Simulation cancelled\nPROGRE100.0\n", ended, {"Simulation cancelled", " 10.0 %"}, "100.0 %"},
+      {"", vanished, {"  gone\n", "process 77"}, "q cancel"},
+      {"MESLBL of 0\n", running, {"4 (0 planned), 1 failed"}, "4 of"},
+      {"MESLBL of 0\nSTATUSEnded: Error: odd\nPROGRE100.0\n", ended, {"    - %", "Error: odd"}, "q cancel"},
       {"STATUSInitialisation\n",
-       RunPresence::running,
+       running,
        {"basin  ", "    - %", "Evaluations  none yet", "Best so far  none yet"},
-       {}}};
-  for (const Case& example : cases) {
+       "Größe"}};
+  for (const auto& [records, presence, shown, notShown] : cases) {
     const std::string text =
-        textOf(layoutScreen(stateOf(example.records), situationOf(example.presence), {80, 24}, CharacterSet::utf8));
-    for (const std::string& shown : example.shown) EXPECT_THAT(text, HasSubstr(shown));
-    for (const std::string& notShown : example.notShown) EXPECT_THAT(text, Not(HasSubstr(notShown)));
+        textOf(layoutScreen(stateOf(records), situationOf(presence), {80, 24}, CharacterSet::utf8));
+    for (const std::string& part : shown) EXPECT_THAT(text, HasSubstr(part));
+    EXPECT_THAT(text, Not(HasSubstr(notShown)));
   }
 }
 
 TEST(ScreenLayout, ARunThatHasGoneQuietIsPointedOutByItsOwnPace) {
-  struct Case {
-    double quietSeconds;
-    const char* shown;
-  };
   // At 36 evaluations an hour three of them take five minutes.
-  for (const Case& example : {Case{10.0, "  running\n"}, {290.0, "  running\n"}, {310.0, "no news for 5 min 10 s\n"}}) {
-    ViewerSituation situation = situationOf();
-    situation.now = 1795226400.0 + example.quietSeconds;
-    EXPECT_THAT(textOf(layoutScreen(stateOf(), situation, {80, 24}, CharacterSet::utf8)), HasSubstr(example.shown));
+  for (const auto& [quietSeconds, shown] :
+       {std::pair{10.0, "  running\n"}, {290.0, "  running\n"}, {310.0, "no news for 5 min 10 s\n"}}) {
+    const ViewerSituation situation = situationOf(RunPresence::running, 1795226400.0 + quietSeconds);
+    EXPECT_THAT(textOf(layoutScreen(stateOf(), situation, {80, 24}, CharacterSet::utf8)), HasSubstr(shown));
   }
 }
 
@@ -209,19 +197,15 @@ TEST(DisplayText, NumbersForPeople) {
 }
 
 TEST(DisplayText, OnlyWhatATerminalShowsOnOneLineIsLetThrough) {
-  struct Case {
-    std::string raw;
-    std::string utf8;
-    std::string ascii;
-  };
-  for (const Case& example : {Case{"a\tb\rc\x1b[31m", "a b?c?[31m", "a b?c?[31m"},
-                              {"Gr\u00FC\u00DFe", "Gr\u00FC\u00DFe", "Gr??e"},
-                              {"\xc0\xaf\xed\xa0\x80\xf5", "??????", "??????"},
-                              {"\xe2\x82", "??", "??"},
-                              {"x\u202Ey\u009Bz", "x?y?z", "x?y?z"},
-                              {std::string("\0\x7f", 2), "??", "??"}}) {
-    EXPECT_EQ(printable(example.raw, CharacterSet::utf8), example.utf8);
-    EXPECT_EQ(printable(example.raw, CharacterSet::ascii), example.ascii);
+  const std::tuple<std::string, const char*, const char*> cases[] = {{"a\tb\rc\x1b[31m", "a b?c?[31m", "a b?c?[31m"},
+                                                                     {"Gr\u00FC\u00DFe", "Gr\u00FC\u00DFe", "Gr??e"},
+                                                                     {"\xc0\xaf\xed\xa0\x80\xf5", "??????", "??????"},
+                                                                     {"\xe2\x82", "??", "??"},
+                                                                     {"x\u202Ey\u009Bz", "x?y?z", "x?y?z"},
+                                                                     {std::string("\0\x7f", 2), "??", "??"}};
+  for (const auto& [raw, utf8, ascii] : cases) {
+    EXPECT_EQ(printable(raw, CharacterSet::utf8), utf8);
+    EXPECT_EQ(printable(raw, CharacterSet::ascii), ascii);
   }
   EXPECT_EQ(displayWidth("\u6C34\u00FCe\u0301"), 4);
   EXPECT_EQ(fitted("\u6C34\u6C34\u6C34", 5, CharacterSet::utf8), "\u6C34\u6C34\u2026");

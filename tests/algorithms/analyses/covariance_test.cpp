@@ -1,21 +1,16 @@
 #include "algorithms/analyses/covariance.h"
 
 #include <cmath>
-#include <limits>
 
 #include <fmt/format.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include "algorithms/analyses/local_sensitivity.h"
+#include "matchers.h"
 
 namespace mirevo {
 namespace {
-
-using ::testing::ElementsAre;
-using ::testing::HasSubstr;
-
-constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
 
 SearchSpace spaceOf(std::vector<double> initial, TransformationType type = TransformationType::none) {
   SearchSpace space;
@@ -46,7 +41,7 @@ TEST(ParameterCovariance, MatchesTheStraightLineInClosedForm) {
   // but for those of the former.
   LinearisedModel weighted = line;
   weighted.weights = {2, 1, 1, 1, 1};
-  LinearisedModel doubled{{0.1, 0.1, -0.2, 0.3, -0.3, 0.1, kNaN}, {}, {{1, 1, 1, 1, 1, 1, 1}, {0, 0, 1, 2, 3, 4, 9}}};
+  LinearisedModel doubled{{0.1, 0.1, -0.2, 0.3, -0.3, 0.1, NAN}, {}, {{1, 1, 1, 1, 1, 1, 1}, {0, 0, 1, 2, 3, 4, 9}}};
   const ParameterCovariance a = parameterCovariance(weighted);
   const ParameterCovariance b = parameterCovariance(doubled);
   EXPECT_EQ(b.observationCount, 6U);
@@ -65,7 +60,7 @@ TEST(ParameterCovariance, LeavesOutWhatHasNoVarianceByName) {
   // Columns: constant, zero, unknown, line, constant + 2 line.
   const LinearisedModel model{{0.1, -0.2, 0.3, -0.3, 0.1},
                               {},
-                              {{1, 1, 1, 1, 1}, {0, 0, 0, 0, 0}, {1, kNaN, 2, 3, 4}, {0, 1, 2, 3, 4}, {1, 3, 5, 7, 9}}};
+                              {{1, 1, 1, 1, 1}, {0, 0, 0, 0, 0}, {1, NAN, 2, 3, 4}, {0, 1, 2, 3, 4}, {1, 3, 5, 7, 9}}};
   const ParameterCovariance result = parameterCovariance(model);
   EXPECT_THAT(result.kept, ElementsAre(0, 3));
   EXPECT_NEAR(result.covariance[1][1], 0.1 * 0.08, 1e-15);

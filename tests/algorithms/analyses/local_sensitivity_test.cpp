@@ -8,12 +8,11 @@
 #include <gtest/gtest.h>
 
 #include "algorithms/function_evaluator.h"
+#include "matchers.h"
 
 namespace mirevo {
 namespace {
 
-using ::testing::Contains;
-using ::testing::ElementsAre;
 using testing::FunctionEvaluator;
 
 struct Parameter {

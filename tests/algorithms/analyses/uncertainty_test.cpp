@@ -9,6 +9,7 @@
 #include "algorithms/function_evaluator.h"
 #include "algorithms/numbers/sample_summary.h"
 #include "algorithms/numbers/uniform_generator.h"
+#include "matchers.h"
 
 namespace mirevo {
 namespace {
@@ -74,13 +75,12 @@ TEST(UncertaintyAnalysis, EvaluatesOneBatchAndLeavesFailuresOut) {
   EXPECT_EQ(summary.parameters[0].count, 5U);
   EXPECT_THAT(
       formatUncertainty(summary, {{"K"}, {"bias", "peak"}, {"low"}}),
-      ::testing::ElementsAre(
+      ElementsAre(
           "Uncertainty analysis: 5 evaluations, 2 failed and left out of the statistics", "",
-          ::testing::HasSubstr("Parameter (search scale)"),
+          HasSubstr("Parameter (search scale)"),
           "   K                                     1              0              1              1              1"
           "              1              1",
-          "", ::testing::HasSubstr("Std. deviation"), ::testing::HasSubstr("bias "), ::testing::HasSubstr("peak "), "",
-          ::testing::HasSubstr("95 %"),
+          "", HasSubstr("Std. deviation"), HasSubstr("bias "), HasSubstr("peak "), "", HasSubstr("95 %"),
           "   low                             2              1            1.1            1.5              2"
           "            2.5            2.9",
           "", "   Sample correlation              K", "   K                               1"));

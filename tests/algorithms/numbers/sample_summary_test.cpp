@@ -12,12 +12,10 @@
 namespace mirevo {
 namespace {
 
-constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
-
 TEST(SampleSummary, MatchesAWorkedExample) {
   // 2 4 4 5 10 with values that do not count: mean 5, squares 9 + 1 + 1 + 0 + 25 = 36, 5 % at position 0.2.
   const SampleSummary summary =
-      summariseSample(std::vector<double>{10, 4, kNaN, 2, 5, 4, std::numeric_limits<double>::infinity()});
+      summariseSample(std::vector<double>{10, 4, NAN, 2, 5, 4, std::numeric_limits<double>::infinity()});
   EXPECT_EQ(summary.count, 5U);
   EXPECT_EQ(summary.mean, 5.0);
   EXPECT_EQ(summary.standardDeviation, 3.0);
@@ -47,7 +45,7 @@ TEST(SeriesBand, HasTheQuantilesOfWhatSucceededAndCountsTheObservationsInside) {
   for (std::size_t i = 0; i < results.size(); ++i) {
     if (i == 7) continue;                                                          // failed
     const double value = static_cast<double>((37 * (i - (i > 7 ? 1 : 0))) % 101);  // 0 to 100, shuffled
-    results[i].simulatedValues = {-1.0, value, value, i == 0 ? kNaN : value, kNaN, -value};
+    results[i].simulatedValues = {-1.0, value, value, i == 0 ? NAN : value, NAN, -value};
   }
   const SeriesBand band = seriesBand(std::vector{5.0, 4.9, 50.0, 1.0, -95.0}, results, 1);
   EXPECT_DOUBLE_EQ(band.lower[0], 5.0);

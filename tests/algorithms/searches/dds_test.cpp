@@ -18,7 +18,6 @@ namespace {
 using testing::FunctionEvaluator;
 using testing::resultOf;
 
-constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
 constexpr const char* kBudgetUsed = "Optimisation terminated: Maximum number of model evaluations reached";
 
 /// The given deviates in order; running past their end fails the test.
@@ -110,9 +109,9 @@ TEST(Dds, PerturbsAsManyParametersAsTheNumberOfTheEvaluationSays) {
 }
 
 TEST(Dds, EqualReplacesAndNaNNeverDoes) {
-  const std::tuple<double, double, bool> cases[] = {{1.0, 1.0, true},    {1.0, 1.5, false},
-                                                    {1.0, kNaN, false},  {kNaN, 1.0, true},
-                                                    {kNaN, kNaN, false}, {kFailedRunValue, kFailedRunValue, true}};
+  const std::tuple<double, double, bool> cases[] = {{1.0, 1.0, true},  {1.0, 1.5, false},
+                                                    {1.0, NAN, false}, {NAN, 1.0, true},
+                                                    {NAN, NAN, false}, {kFailedRunValue, kFailedRunValue, true}};
   for (const auto& [start, candidate, isReplaced] : cases) {
     FunctionEvaluator evaluator([&, value = start, later = candidate](const ParameterSet&) mutable {
       return resultOf(std::exchange(value, later));
@@ -123,7 +122,7 @@ TEST(Dds, EqualReplacesAndNaNNeverDoes) {
     EXPECT_EQ(dds.summary().best == evaluator.batches[1][0], isReplaced) << start << " " << candidate;
     EXPECT_EQ(dds.summary().bestResult.number, isReplaced ? 2 : 1);
   }
-  FunctionEvaluator third([&](const ParameterSet&) { return resultOf(third.evaluationCount == 2 ? 9.0 : kNaN); });
+  FunctionEvaluator third([&](const ParameterSet&) { return resultOf(third.evaluationCount == 2 ? 9.0 : NAN); });
   UniformGenerator random(1);
   Dds dds({}, 5, false, box(2, 0.0, 1.0), third, random);
   run(dds);
@@ -153,7 +152,7 @@ TEST(Dds, RefusesImpossibleInputWithAStatus) {
                                                 {box(2, 0, 1), 0},
                                                 {{{0.0}, {1.0, 2.0}, {0.0}}, 10},
                                                 {box(1, 1, 0), 10},
-                                                {box(1, kNaN, 1), 10},
+                                                {box(1, NAN, 1), 10},
                                                 {box(1, -huge, huge), 10},
                                                 {{{0.0}, {1.0}, {}}, 10}};
   for (const auto& [bounds, budget] : cases) {

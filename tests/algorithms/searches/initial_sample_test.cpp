@@ -10,14 +10,11 @@
 
 #include "algorithms/numbers/latin_hypercube.h"
 #include "algorithms/numbers/sobol.h"
-#include "common/fatal_error.h"
+#include "matchers.h"
+#include "refusal.h"
 
 namespace mirevo {
 namespace {
-
-using testing::DoubleEq;
-using testing::ElementsAre;
-using testing::HasSubstr;
 
 /// Whether each of the `count` strata of every coordinate holds one of the first `count` points.
 void expectOnePointAStratum(const UnitPoints& points, std::size_t count) {
@@ -67,8 +64,7 @@ TEST(InitialSample, DrawsWithinBoundsTheInitialSetFirst) {
       ASSERT_EQ(sample.size(), 9U);
       EXPECT_EQ(sample.front() == bounds.initial, isIncluded) << generation;
       for (const ParameterSet& set : sample) {
-        EXPECT_THAT(set, ElementsAre(testing::AllOf(testing::Ge(-1), testing::Le(1)), 2,
-                                     testing::AllOf(testing::Ge(5), testing::Le(9))));
+        EXPECT_THAT(set, ElementsAre(AllOf(testing::Ge(-1), testing::Le(1)), 2, AllOf(testing::Ge(5), testing::Le(9))));
       }
       UniformGenerator again(-7);
       EXPECT_EQ(drawInitialSample({isIncluded, SampleGeneration{generation}, ""}, {}, bounds, 9, again), sample)
@@ -115,13 +111,9 @@ TEST(InitialSample, NamesTheLineOfWhatIsWrongInAFile) {
       {"k layers n\n1 0.5 0\n", "value 0.5 of parameter \"layers\" lies outside its bounds"},
   };
   for (const auto& [text, detail] : cases) {
-    try {
-      readInitialSample("s.txt", text, kSpace);
-      ADD_FAILURE() << text;
-    } catch (const FatalError& error) {
-      EXPECT_EQ(error.message(), "Error: Initial sample file invalid");
-      EXPECT_THAT(error.detail(), HasSubstr(detail)) << text;
-    }
+    EXPECT_THAT(refusalOf([&, &content = text] { readInitialSample("s.txt", content, kSpace); }),
+                AllOf(StartsWith("Error: Initial sample file invalid\n"), HasSubstr(detail)))
+        << text;
   }
 }
 

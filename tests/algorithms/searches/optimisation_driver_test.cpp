@@ -10,7 +10,8 @@
 #include "algorithms/searches/pse.h"
 #include "algorithms/searches/sce.h"
 #include "algorithms/surrogate/proposal_selector.h"
-#include "common/fatal_error.h"
+#include "matchers.h"
+#include "refusal.h"
 
 namespace mirevo {
 namespace {
@@ -44,18 +45,13 @@ TEST(OptimisationDriver, ReportsEveryTenthLoopAndTheLast) {
     std::vector<std::string> lines;
     runSearch(search, "SCE", [&](std::string_view line) { lines.emplace_back(line); });
     EXPECT_EQ(lines.size(), static_cast<std::size_t>(reports)) << loops;
-    EXPECT_THAT(lines.back(), ::testing::StartsWith("Loop " + std::to_string(loops) + ": 0 model evaluations"));
+    EXPECT_THAT(lines.back(), StartsWith("Loop " + std::to_string(loops) + ": 0 model evaluations"));
   }
 }
 
 TEST(OptimisationDriver, EndsTheRunForAStatusOtherThanZeroInEitherStep) {
-  const auto messageOf = [](ScriptedSearch&& search, std::string_view name) -> std::string {
-    try {
-      runSearch(search, name, {});
-    } catch (const FatalError& error) {
-      return error.message();
-    }
-    return "";
+  const auto messageOf = [](ScriptedSearch search, std::string_view name) {
+    return refusalMessageOf([&] { runSearch(search, name, {}); });
   };
   EXPECT_EQ(messageOf({1, 0, 3}, "SCE"), "Error: Invalid operation in SCE algorithm");
   EXPECT_EQ(messageOf({0, -4, 3}, "PSE"), "Error: Invalid operation in PSE algorithm");
@@ -79,18 +75,7 @@ TEST(OptimisationDriver, WarnsOnceOfANegativeBestValueOfTheSample) {
 }
 
 TEST(OptimisationDriver, SendsWhatTheSurrogateModelChoseInItsOwnMode) {
-  class ModeRecorder final : public Evaluator {
-   public:
-    std::vector<EvaluationResult> evaluateParameterSets(std::span<const ParameterSet> sets,
-                                                        DispatchMode mode) override {
-      modes.push_back(mode);
-      std::vector<EvaluationResult> results;
-      for (const ParameterSet& set : sets) results.push_back(testing::resultOf(set[0] * set[0]));
-      return results;
-    }
-    std::vector<DispatchMode> modes;
-  };
-  ModeRecorder evaluator;
+  testing::FunctionEvaluator evaluator([](const ParameterSet& x) { return testing::resultOf(x[0] * x[0]); });
   UniformGenerator random(1);
   PseMethod method;
   method.settings.populationSize = 8;
@@ -99,7 +84,7 @@ TEST(OptimisationDriver, SendsWhatTheSurrogateModelChoseInItsOwnMode) {
   const SearchSummary summary = method.run({bounds, {24, 1000, 0.0}, {}, {}, evaluator, random, &selector}, {});
   EXPECT_EQ(summary.evaluationCount, 24);
   using enum DispatchMode;
-  EXPECT_THAT(evaluator.modes, ::testing::ElementsAre(task, task, surrogateSelected));
+  EXPECT_THAT(evaluator.modes, ElementsAre(task, task, surrogateSelected));
 }
 
 }  // namespace

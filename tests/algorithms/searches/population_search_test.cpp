@@ -15,11 +15,13 @@
 #include "algorithms/searches/sce.h"
 #include "algorithms/surrogate/proposal_selector.h"
 #include "algorithms/test_functions.h"
+#include "matchers.h"
 
 namespace mirevo {
 namespace {
 
 using testing::boundsOf;
+using testing::failedResult;
 using testing::FunctionEvaluator;
 using testing::resultOf;
 
@@ -90,25 +92,14 @@ TEST_P(EitherSearch, KeepsToTheBudgetExactly) {
 }
 
 TEST_P(EitherSearch, NeitherFixedParametersNorFailuresStallItOrMakeANotANumber) {
-  const double nan = std::numeric_limits<double>::quiet_NaN();
   const std::vector<std::pair<std::string, FunctionEvaluator::Function>> functions{
       {"smooth", [](const ParameterSet& x) { return resultOf(x[0] * x[0] + x[2] * x[2]); }},
       {"least in a corner", [](const ParameterSet& x) { return resultOf(x[0] - x[2] + 2.0); }},
       {"constant", [](const ParameterSet&) { return resultOf(1.0); }},
-      {"half of it not a number", [nan](const ParameterSet& x) { return resultOf(x[0] < 0.3 ? nan : x[0]); }},
-      {"never a number", [nan](const ParameterSet&) { return resultOf(nan); }},
-      {"half of it failing",
-       [](const ParameterSet& x) {
-         EvaluationResult result = resultOf(x[2] < 0.5 ? kFailedRunValue : x[2]);
-         if (x[2] < 0.5) result.failure.emplace();
-         return result;
-       }},
-      {"all of it failing",
-       [](const ParameterSet&) {
-         EvaluationResult result = resultOf(kFailedRunValue);
-         result.failure.emplace();
-         return result;
-       }},
+      {"half of it not a number", [](const ParameterSet& x) { return resultOf(x[0] < 0.3 ? NAN : x[0]); }},
+      {"never a number", [](const ParameterSet&) { return resultOf(NAN); }},
+      {"half of it failing", [](const ParameterSet& x) { return x[2] < 0.5 ? failedResult() : resultOf(x[2]); }},
+      {"all of it failing", [](const ParameterSet&) { return failedResult(); }},
       {"steps, as of integer parameters",
        [](const ParameterSet& x) { return resultOf(std::abs(std::floor(4 * x[0])) + std::abs(std::floor(4 * x[2]))); }},
   };
@@ -229,12 +220,12 @@ TEST(Sce, ContractsWhereTheReflectionIsNoBetterAndElseTakesARandomPoint) {
   ASSERT_EQ(sce.initialise(), kSearchOk);
   ASSERT_EQ(sce.advance(), kSearchOk);
   ASSERT_EQ(counting.batches.size(), 4U);
-  EXPECT_THAT(counting.batches[1][0], ::testing::ElementsAre(6, 3));
+  EXPECT_THAT(counting.batches[1][0], ElementsAre(6, 3));
   // g + 0.4·(u − g)
-  EXPECT_THAT(counting.batches[2][0], ::testing::ElementsAre(::testing::DoubleEq(5.3), ::testing::DoubleEq(5.8)));
+  EXPECT_THAT(counting.batches[2][0], ElementsAre(DoubleEq(5.3), DoubleEq(5.8)));
   EXPECT_EQ(sce.population().back().set, counting.batches[3][0]);
-  EXPECT_THAT(counting.batches[3][0], ::testing::ElementsAre(::testing::AllOf(::testing::Ge(5), ::testing::Le(6)),
-                                                             ::testing::AllOf(::testing::Ge(5), ::testing::Le(7))));
+  EXPECT_THAT(counting.batches[3][0],
+              ElementsAre(AllOf(::testing::Ge(5), ::testing::Le(6)), AllOf(::testing::Ge(5), ::testing::Le(7))));
 }
 
 TEST(Sce, RunsOneProposalOfEveryComplexAtATime) {
@@ -256,7 +247,7 @@ TEST(Pse, RunsAGenerationInOneBatch) {
   runToEnd(pse);
   std::vector<std::size_t> sizes;
   for (const auto& batch : evaluator.batches) sizes.push_back(batch.size());
-  EXPECT_THAT(sizes, ::testing::ElementsAre(22, 22, 22, 22, 12));
+  EXPECT_THAT(sizes, ElementsAre(22, 22, 22, 22, 12));
 }
 
 /// Every new point is worse than the sample, so that the step of the worst point goes on from move to move.
@@ -272,11 +263,11 @@ TEST(Pse, ReflectsThenContractsAndGivesAStuckPointUp) {
   const ParameterSet reflected{5.5 + 1.1 * 0.5, 5 - 1.1 * 2};
   const ParameterSet contracted{5.5 - 0.4 * 0.5, 5 + 0.4 * 2};
   for (const std::size_t offspring : {1U, 2U}) {
-    EXPECT_THAT(counting.batches[1][offspring], ::testing::Pointwise(::testing::DoubleEq(), reflected));
-    EXPECT_THAT(counting.batches[2][offspring], ::testing::Pointwise(::testing::DoubleEq(), contracted));
+    EXPECT_THAT(counting.batches[1][offspring], ::testing::Pointwise(DoubleEq(), reflected));
+    EXPECT_THAT(counting.batches[2][offspring], ::testing::Pointwise(DoubleEq(), contracted));
   }
-  EXPECT_THAT(pse.population().back().set, ::testing::Not(::testing::ElementsAre(5, 7)));
-  EXPECT_THAT(pse.population().front().set, ::testing::ElementsAre(5, 5));
+  EXPECT_THAT(pse.population().back().set, Not(ElementsAre(5, 7)));
+  EXPECT_THAT(pse.population().front().set, ElementsAre(5, 5));
 }
 
 /// A failed mutation between its moves does not let a point begin again: it is reflected in one generation at most.

@@ -1,10 +1,11 @@
 #include "algorithms/searches/population.h"
 
 #include <cmath>
-#include <limits>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+
+#include "matchers.h"
 
 namespace mirevo {
 namespace {
@@ -16,13 +17,12 @@ Individual individual(ParameterSet set, double value = 0.0) {
 }
 
 TEST(Population, SortsBestFirstAndNotANumberLastKeepingTheOrderOfEquals) {
-  const double nan = std::numeric_limits<double>::quiet_NaN();
-  Population population{individual({0}, nan), individual({1}, 2), individual({2}, kFailedRunValue),
-                        individual({3}, nan), individual({4}, 2), individual({5}, -1)};
+  Population population{individual({0}, NAN), individual({1}, 2), individual({2}, kFailedRunValue),
+                        individual({3}, NAN), individual({4}, 2), individual({5}, -1)};
   sortBestFirst(population);
   std::vector<double> order;
   for (const Individual& member : population) order.push_back(member.set[0]);
-  EXPECT_THAT(order, testing::ElementsAre(5, 1, 4, 2, 0, 3));
+  EXPECT_THAT(order, ElementsAre(5, 1, 4, 2, 0, 3));
 }
 
 TEST(Population, SpreadIsTheMeanStandardDeviationWithDivisorM) {
@@ -43,12 +43,12 @@ TEST(Population, SimplexMoves) {
   const Population population{individual({0.1, 0}), individual({0.1, 1}), individual({0.1, 5})};
   const std::vector<std::size_t> places{0, 1, 2};
   const std::vector<double> g = centroid(population, places);
-  EXPECT_THAT(g, testing::ElementsAre(0.1, 2.0));  // exactly 0.1: a fixed parameter stays where it is
-  EXPECT_THAT(pointOnRay(g, ParameterSet{0.1, 5}, -1.0), testing::ElementsAre(0.1, -1.0));
-  EXPECT_THAT(pointOnRay(g, ParameterSet{0.1, 5}, 0.5), testing::ElementsAre(0.1, 3.5));
+  EXPECT_THAT(g, ElementsAre(0.1, 2.0));  // exactly 0.1: a fixed parameter stays where it is
+  EXPECT_THAT(pointOnRay(g, ParameterSet{0.1, 5}, -1.0), ElementsAre(0.1, -1.0));
+  EXPECT_THAT(pointOnRay(g, ParameterSet{0.1, 5}, 0.5), ElementsAre(0.1, 3.5));
   const Box box = boundingBox(population, std::vector<std::size_t>{1, 2});
-  EXPECT_THAT(box.lower, testing::ElementsAre(0.1, 1));
-  EXPECT_THAT(box.upper, testing::ElementsAre(0.1, 5));
+  EXPECT_THAT(box.lower, ElementsAre(0.1, 1));
+  EXPECT_THAT(box.upper, ElementsAre(0.1, 5));
 }
 
 }  // namespace

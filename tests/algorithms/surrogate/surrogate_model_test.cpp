@@ -7,28 +7,25 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "algorithms/function_evaluator.h"
 #include "algorithms/numbers/latin_hypercube.h"
 #include "algorithms/surrogate/gaussian_process.h"
 #include "algorithms/surrogate/proposal_selector.h"
 #include "algorithms/surrogate/quadratic_surrogate.h"
 #include "algorithms/surrogate/quasi_newton.h"
+#include "matchers.h"
 
 namespace mirevo {
 namespace {
 
+using testing::failedResult;
+using testing::resultOf;
 using Function = double (*)(const std::vector<double>&);
 
 std::vector<double> valuesOf(const UnitPoints& points, Function function) {
   std::vector<double> values;
   for (const auto& point : points) values.push_back(function(point));
   return values;
-}
-
-EvaluationResult resultOf(double value, bool hasFailed = false) {
-  EvaluationResult result;
-  result.aggregate = hasFailed ? kFailedRunValue : value;
-  if (hasFailed) result.failure.emplace();
-  return result;
 }
 
 void expectPredictions(const SurrogateModel& model, Function function, UniformGenerator& random, std::size_t size,
@@ -127,7 +124,7 @@ TEST(QuasiNewtonSearch, GoesDownAValleyAndStopsAtABound) {
   // Also from the bound itself, where each coordinate's slope depends on the other's value.
   for (const std::vector<double>& start : {std::vector{-1.2, 1.0}, {0.5, 4.0}}) {
     const LowPoint bounded = quasiNewtonSearch(function, start, {{-5, -5}, {0.5, 5}}, {0.5, 1.0e-12, 100});
-    EXPECT_THAT(bounded.point, testing::ElementsAre(0.5, testing::DoubleNear(0.25, 1.0e-6)));
+    EXPECT_THAT(bounded.point, ElementsAre(0.5, DoubleNear(0.25, 1.0e-6)));
   }
 }
 
@@ -158,13 +155,13 @@ TEST(ProposalSelector, RanksByPredictionAndLeavesFailuresOut) {
     ProposalSelector selector({40, 100, SurrogateModelType{type}, 2}, bounds);
     EXPECT_EQ(selector.proposalsPerRun(), 3U);
     for (int i = -5; i <= 5; ++i) {
-      selector.note({static_cast<double>(i)}, resultOf((i - 2.0) * (i - 2.0), i == 2));
+      selector.note({static_cast<double>(i)}, i == 2 ? failedResult() : resultOf((i - 2.0) * (i - 2.0)));
     }
     EXPECT_FALSE(selector.isActive(1));
     EXPECT_TRUE(selector.isActive(2));
     const std::vector<ParameterSet> proposals{{-4.5}, {2.6}, {0.5}, {3.5}, {7}};
-    EXPECT_THAT(selector.select(proposals, 2), testing::ElementsAre(1, 3)) << type;
-    EXPECT_THAT(selector.select(proposals, 9), testing::ElementsAre(0, 1, 2, 3, 4)) << type;
+    EXPECT_THAT(selector.select(proposals, 2), ElementsAre(1, 3)) << type;
+    EXPECT_THAT(selector.select(proposals, 9), ElementsAre(0, 1, 2, 3, 4)) << type;
   }
 }
 
@@ -189,7 +186,7 @@ TEST(ProposalSelector, FindsTheModelsMinimumInItsNeighbourhoodOnce) {
     EXPECT_EQ(minima.size(), 1u) << "one place for all centres";
     EXPECT_EQ(minima.front().centre, 0u);
     const ParameterSet found = minima.front().set;
-    EXPECT_THAT(found, testing::ElementsAre(testing::DoubleNear(2.0, 0.1), 3.0, testing::DoubleNear(-1.0, 0.1)));
+    EXPECT_THAT(found, ElementsAre(DoubleNear(2.0, 0.1), 3.0, DoubleNear(-1.0, 0.1)));
     selector.note(found, at(found[0], found[2]));
     // The polynomial is exact, so that its minimum stays there.
     if (type == 0) {
@@ -219,7 +216,7 @@ TEST(ProposalSelector, StaysAwayFromWhereARunFailed) {
   ProposalSelector selector({25, 0, SurrogateModelType::quadraticPolynomial, 1}, bounds);
   const auto note = [&selector](double x, double y) {
     const bool hasFailed = std::floor(x) == 7 && std::abs(y - 5) < 0.5;
-    selector.note({x, y}, resultOf(std::pow(std::floor(x) - 7, 2) + (y - 5) * (y - 5), hasFailed));
+    selector.note({x, y}, hasFailed ? failedResult() : resultOf(std::pow(std::floor(x) - 7, 2) + (y - 5) * (y - 5)));
   };
   for (double x = 2; x <= 12; x += 2) {
     for (double y = 2; y <= 12; y += 2) note(x, y);
@@ -232,8 +229,8 @@ TEST(ProposalSelector, StaysAwayFromWhereARunFailed) {
   }
   // The failed one itself, one that is nearer to it than to any other, and one far away.
   const std::vector<ParameterSet> proposals{{7.1, 5.0}, {7.9, 5.4}, {11, 1}};
-  EXPECT_THAT(selector.select(proposals, 1), testing::ElementsAre(2));
-  EXPECT_THAT(selector.select(std::span(proposals).first(2), 1), testing::ElementsAre(1));
+  EXPECT_THAT(selector.select(proposals, 1), ElementsAre(2));
+  EXPECT_THAT(selector.select(std::span(proposals).first(2), 1), ElementsAre(1));
 }
 
 TEST(ProposalSelector, TakesIntegerParametersAsTheModelDoes) {
@@ -250,7 +247,7 @@ TEST(ProposalSelector, TakesIntegerParametersAsTheModelDoes) {
     ASSERT_EQ(minima.size(), 1u) << type;
     EXPECT_EQ(std::floor(minima.front().set[0]), 4.0) << type;
     // The first makes the run of (5.1, 0) again.
-    EXPECT_THAT(selector.select(std::vector<ParameterSet>{{5.9, 0.0}, {6.2, 0.8}}, 1), testing::ElementsAre(1)) << type;
+    EXPECT_THAT(selector.select(std::vector<ParameterSet>{{5.9, 0.0}, {6.2, 0.8}}, 1), ElementsAre(1)) << type;
     note(minima.front().set[0], minima.front().set[1]);
     for (const PredictedMinimum& next : selector.minima(std::vector<ParameterSet>{{4.9, 0.0}})) {
       EXPECT_NE(next.set, minima.front().set) << type;

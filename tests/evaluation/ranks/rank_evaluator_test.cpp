@@ -5,15 +5,10 @@
 #include "evaluation/evaluation_fixture.h"
 #include "evaluation/fake_job.h"
 #include "evaluation/fake_launcher.h"
+#include "matchers.h"
 
 namespace mirevo {
 namespace {
-
-using testing::AllOf;
-using testing::Contains;
-using testing::ElementsAre;
-using testing::HasSubstr;
-using testing::StartsWith;
 
 /// A master with workers that answer when the test lets them: each result is the set's value less 1.
 class RankEvaluatorTest : public EvaluationTest {

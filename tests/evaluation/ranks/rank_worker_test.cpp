@@ -3,13 +3,10 @@
 #include "evaluation/evaluation_fixture.h"
 #include "evaluation/fake_job.h"
 #include "evaluation/fake_launcher.h"
+#include "matchers.h"
 
 namespace mirevo {
 namespace {
-
-using testing::ElementsAre;
-using testing::HasSubstr;
-using testing::IsEmpty;
 
 /// A worker whose master sends the next of `sets` for each answer, and then stop.
 class RankWorkerTest : public EvaluationTest {
@@ -75,7 +72,7 @@ TEST_F(RankWorkerTest, KeepsTheFolderOfItsLastRunWhereTheMasterSaysSo) {
     sendNext(message);
   };
   runWorkerLoop(job_, *runner_);
-  EXPECT_THAT(folder_.read("run_Failed17/parameters.txt"), testing::EndsWith(" 2\n"));
+  EXPECT_THAT(folder_.read("run_Failed17/parameters.txt"), EndsWith(" 2\n"));
   EXPECT_THAT(sentTags(), ElementsAre(RankMessage::ready, RankMessage::result, RankMessage::result));
 }
 

@@ -9,14 +9,11 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "matchers.h"
 #include "refusal.h"
 
 namespace mirevo {
 namespace {
-
-using ::testing::AllOf;
-using ::testing::HasSubstr;
-using ::testing::StartsWith;
 
 /// Names that are easy to confuse with each other, with functions, constants, numbers and operators.
 class ExpressionEvaluatorTest : public ::testing::Test {

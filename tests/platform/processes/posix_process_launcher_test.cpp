@@ -6,10 +6,12 @@
 #include <sys/wait.h>
 #include <tuple>
 #include <unistd.h>
+#include <utility>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "matchers.h"
 #include "platform/processes/process_folder.h"
 #include "processes.h"
 #include "temporary_folder.h"
@@ -17,7 +19,6 @@
 namespace mirevo {
 namespace {
 
-using testing::ElementsAre;
 using Kind = BatchFailure::Kind;
 
 class PosixProcessLauncherTest : public testing::Test {
@@ -233,10 +234,7 @@ TEST_F(PosixProcessLauncherTest, HaltingIsGentleFirstAndThenSure) {
 
 TEST_F(PosixProcessLauncherTest, NothingOutlivesTheProgram) {
   // Each way for a program to end, with two slots running a shell, a daemon, a model and a stubborn grandchild each.
-  const struct {
-    const char* name;
-    std::function<void()> end;
-  } cases[] = {
+  const std::pair<const char*, std::function<void()>> cases[] = {
       {"kill -9", [] { ::kill(::getpid(), SIGKILL); }},
       {"leaves from a signal handler",
        [] {
@@ -253,7 +251,7 @@ TEST_F(PosixProcessLauncherTest, NothingOutlivesTheProgram) {
       "while ! [ -s daemon.txt ]; do sleep 0.01; done\n" MIREVO_TEST_MODEL
       " --grandchild id.txt --ignore-term 1 --sleep-ms 3600000\necho never >never.txt");
   settings_.slotCount = 2;
-  for (const auto& c : cases) {
+  for (const auto& [name, end] : cases) {
     const pid_t program = ::fork();
     if (program == 0) {
       PosixProcessLauncher launcher;
@@ -261,19 +259,19 @@ TEST_F(PosixProcessLauncherTest, NothingOutlivesTheProgram) {
       launcher.createProcesses(1);
       launcher.createProcesses(2);
       waitUntil([&] { return hasContent("run_Process1/id.txt") && hasContent("run_Process2/id.txt"); });
-      c.end();
+      end();
       ::_exit(9);
     }
     int status = 0;
     ASSERT_EQ(::waitpid(program, &status, 0), program);
-    EXPECT_FALSE(WIFEXITED(status) && WEXITSTATUS(status) == 9) << c.name;
+    EXPECT_FALSE(WIFEXITED(status) && WEXITSTATUS(status) == 9) << name;
     for (const char* slot : {"run_Process1", "run_Process2"}) {
       for (const char* file : {"/id.txt", "/daemon.txt"}) {
         const std::string id = folder_.read(slot + std::string(file));
-        ASSERT_FALSE(id.empty()) << c.name;
-        EXPECT_TRUE(waitUntil([&] { return !isRunning(std::stoi(id)); })) << c.name << file;
+        ASSERT_FALSE(id.empty()) << name;
+        EXPECT_TRUE(waitUntil([&] { return !isRunning(std::stoi(id)); })) << name << file;
       }
-      EXPECT_FALSE(folder_.exists(std::string(slot) + "/never.txt")) << c.name;
+      EXPECT_FALSE(folder_.exists(std::string(slot) + "/never.txt")) << name;
     }
   }
 }
@@ -294,7 +292,7 @@ TEST_F(PosixProcessLauncherTest, RefusesToStartWithAReason) {
     settings_.processFolderPrefix = prefix;
     settings_.batchItems = {{batchFile, arguments}};
     EXPECT_FALSE(launcher_.initialise(settings_));
-    EXPECT_THAT(launcher_.lastError(), testing::EndsWith(reason));
+    EXPECT_THAT(launcher_.lastError(), EndsWith(reason));
   }
   EXPECT_TRUE(folder_.exists("run_Process1/model/run.sh")) << "the model itself was removed";
 }

@@ -9,12 +9,11 @@
 #include <gtest/gtest.h>
 
 #include "common/calendar.h"
+#include "matchers.h"
 #include "platform/series/shown_values.h"
 
 namespace mirevo {
 namespace {
-
-using ::testing::ElementsAre;
 
 TEST(CsvTimeSeries, ReadsEveryFormOfFile) {
   // Each is the same series: 1.5 at 2000-02-28 00:00, missing at 12:00, -200 at 24:00 (the 29th), 0.25 on the 1st.
@@ -128,7 +127,7 @@ TEST(CsvTimeSeries, OpenSaysWhyAFileCannotBeRead) {
   EXPECT_FALSE(series.open("no_such_folder/q.csv"));
   EXPECT_EQ(series.lastError(), "no_such_folder/q.csv: No such file or directory");
   EXPECT_FALSE(series.open(::testing::TempDir()));
-  EXPECT_THAT(series.lastError(), ::testing::EndsWith("Is a directory"));
+  EXPECT_THAT(series.lastError(), EndsWith("Is a directory"));
   EXPECT_FALSE(series.open("/dev/zero"));
   EXPECT_EQ(series.lastError(), "/dev/zero: Not a regular file");
   // The same object reads another file after a failure, with nothing left of the one before.

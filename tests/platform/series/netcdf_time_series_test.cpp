@@ -11,15 +11,12 @@
 #include <netcdf.h>
 
 #include "common/calendar.h"
+#include "matchers.h"
 #include "platform/series/netcdf_units.h"
 #include "platform/series/shown_values.h"
 
 namespace mirevo {
 namespace {
-
-using ::testing::DoubleNear;
-using ::testing::ElementsAre;
-using ::testing::HasSubstr;
 
 /// A file that a test writes by calls of the library; values go into it as it is closed.
 class NetcdfFile final {
@@ -143,26 +140,27 @@ TEST(NetcdfTimeSeries, TakesTheTimeVariableThatIsNamedLikeItsDimension) {
 }
 
 TEST(NetcdfTimeSeries, RefusesByName) {
-  const std::tuple<const char*, const char*, std::vector<double>, const char*> cases[] = {
-      {"days since 1990-01-01",
+  const std::string days = "days since 1990-01-01";
+  const std::string time = "variable \"time\"";
+  const std::tuple<std::string, std::string, std::vector<double>, std::string> cases[] = {
+      {days,
        "noleap",
        {0, 1},
-       "variable \"time\": expected the calendar standard, gregorian or proleptic_gregorian, found \"noleap\""},
+       time + ": expected the calendar standard, gregorian or proleptic_gregorian, found \"noleap\""},
       {"months since 1990-01-01",
        "",
        {0, 1},
-       "variable \"time\": expected time units like \"hours since 1990-01-01 00:00\", found \"months since "
-       "1990-01-01\""},
-      {"days since 1990-01-01", "", {0, 2, 2}, "variable \"time\", step 3: expected a time later than 2, found 2"},
-      {"days since 1990-01-01", "", {3, 2}, "variable \"time\", step 2: expected a time later than 3, found 2"},
-      {"days since 1990-01-01", "", {0, NC_FILL_DOUBLE}, "variable \"time\", step 2: expected a time, found 9.96"},
-      {"days since 1990-01-01", "", {1e300}, "variable \"time\", step 1: expected a time, found 1e+300"},
+       time + ": expected time units like \"hours since 1990-01-01 00:00\", found \"months since 1990-01-01\""},
+      {days, "", {0, 2, 2}, time + ", step 3: expected a time later than 2, found 2"},
+      {days, "", {3, 2}, time + ", step 2: expected a time later than 3, found 2"},
+      {days, "", {0, NC_FILL_DOUBLE}, time + ", step 2: expected a time, found 9.96"},
+      {days, "", {1e300}, time + ", step 1: expected a time, found 1e+300"},
       {"days", "", {0}, "expected a time variable over one dimension with units like"},
   };
   for (const auto& [units, calendar, times, error] : cases) {
     NetcdfFile file("refused.nc");
     const int axis = file.time(file.dimension("time", times.size()), units, times);
-    if (*calendar != '\0') file.text(axis, "calendar", calendar);
+    if (!calendar.empty()) file.text(axis, "calendar", calendar);
     file.close();
     NetcdfTimeSeries series;
     EXPECT_FALSE(series.open(file.path())) << error;
@@ -189,7 +187,7 @@ TEST(NetcdfTimeSeries, FilesThatAreNoneOrCutOffAreRefused) {
   file.writeFlow({0, 1, 2, 3});
   std::filesystem::resize_file(file.path(), std::filesystem::file_size(file.path()) / 2);
   EXPECT_FALSE(series.open(file.path()));
-  EXPECT_THAT(series.lastError(), ::testing::StartsWith(file.path() + ": "));
+  EXPECT_THAT(series.lastError(), StartsWith(file.path() + ": "));
 }
 
 // The library reads zeros beyond the end of a classic file: a run that stopped half-way would count as a good one.

@@ -12,11 +12,10 @@ namespace mirevo {
 namespace {
 
 constexpr float kGap = -99.0F;
-constexpr float kNaN = std::numeric_limits<float>::quiet_NaN();
 
 MemoryTimeSeries sampleSeries() {
   return MemoryTimeSeries({2001, 1, 1}, {0.0, 1.0, 2.0, 3.0, 5.0, 6.0, 7.0},
-                          {{1.0F, 3.0F, kGap, 4.0F, 8.0F, kNaN, 0.5F}}, kGap);
+                          {{1.0F, 3.0F, kGap, 4.0F, 8.0F, NAN, 0.5F}}, kGap);
 }
 
 TEST(TimeSeriesObject, ValueAtATimeIsThatOfTheStepOrLinearBetween) {

@@ -46,17 +46,17 @@ async function checkHostile(page) {
 }
 
 const cases = {
-  'a search': [sample.optimisation(), 6 + 2 + 3 + 2, kOptimisation],
-  'a search by few evaluations with two series': [sample.optimisation({ count: 12, measures: 2, days: 40, algorithm: 'DDS' }), 6 + 1 + 6 + 2,
+  'a search': [sample.dataOf('optimisation'), 3 + 2 + 2 + 2, kOptimisation],
+  'a search by few evaluations with two series': [sample.twoSeries(), 6 + 1 + 2 + 2,
     kOptimisation.filter((id) => id !== 'failures')],
-  'an uncertainty analysis': [sample.uncertainty(), 1 + 1 + 9 + 6, ['band', 'parameters', 'results', 'progress', 'distributions', 'dotty', 'run', 'summary']],
-  'a sensitivity analysis': [sample.sensitivity(), 4, ['sensitivity', 'parameters', 'results', 'run', 'summary']],
-  'scenario runs': [sample.scenarios(), 3 + 1 + 6, ['series', 'parameters', 'results', 'progress', 'dotty', 'run', 'summary']],
+  'an uncertainty analysis': [sample.dataOf('uncertainty'), 1 + 3 + 1 + 5 + 2, ['band', 'series', 'parameters', 'results', 'progress', 'distributions', 'dotty', 'failures', 'run', 'summary']],
+  'a sensitivity analysis': [sample.dataOf('sensitivity'), 4 + 3, ['sensitivity', 'series', 'parameters', 'results', 'run', 'summary']],
+  'scenario runs': [sample.dataOf('scenarios'), 3 + 1 + 2, ['series', 'parameters', 'results', 'progress', 'dotty', 'run', 'summary']],
   'a run without an evaluation': [sample.empty(), 0, ['run']],
-  'a run whose evaluations all failed': [sample.allFailed(), 0, ['parameters', 'results', 'failures', 'run', 'summary']],
-  'a search with hostile names': [sample.hostile(sample.optimisation()), 6 + 2 + 3 + 2, kOptimisation, true],
-  'an uncertainty analysis with hostile names': [sample.hostile(sample.uncertainty()), 17, null, true],
-  'a sensitivity analysis with hostile names': [sample.hostile(sample.sensitivity()), 4, null, true],
+  'a run whose evaluations all failed': [sample.dataOf('allFailed'), 0, ['parameters', 'results', 'failures', 'run', 'summary']],
+  'a search with hostile names': [sample.hostile(sample.dataOf('optimisation')), 3 + 2 + 2 + 2, kOptimisation, true],
+  'an uncertainty analysis with hostile names': [sample.hostile(sample.dataOf('uncertainty')), 12, null, true],
+  'a sensitivity analysis with hostile names': [sample.hostile(sample.dataOf('sensitivity')), 7, null, true],
 };
 
 for (const [name, [data, charts, expected, text]] of Object.entries(cases)) {
@@ -78,7 +78,7 @@ for (const [name, [data, charts, expected, text]] of Object.entries(cases)) {
 }
 
 test('a chart zooms by dragging and by the wheel, is reset, and changes to a logarithmic axis', async () => {
-  await withReport(sample.optimisation(), {}, async (page) => {
+  await withReport(sample.dataOf('optimisation'), {}, async (page) => {
     for (const section of ['#series', '#progress', '#dotty']) {
       const figure = await page.$(`${section} figure`);
       await figure.scrollIntoViewIfNeeded();
@@ -111,7 +111,7 @@ test('a chart zooms by dragging and by the wheel, is reset, and changes to a log
 });
 
 test('the reader changes what dots are drawn against, and between light and dark', async () => {
-  await withReport(sample.optimisation({ count: 200 }), { colorScheme: 'light' }, async (page) => {
+  await withReport(sample.dataOf('optimisation'), { colorScheme: 'light' }, async (page) => {
     const ground = () => page.evaluate(() => getComputedStyle(document.body).backgroundColor);
     const light = await ground();
     await page.locator('nav button').click();
@@ -122,9 +122,9 @@ test('the reader changes what dots are drawn against, and between light and dark
 });
 
 test('a print has every chart, in light colours, and leaves the screen as it was', async () => {
-  await withReport(sample.optimisation(), { colorScheme: 'dark' }, async (page) => {
+  await withReport(sample.dataOf('optimisation'), { colorScheme: 'dark' }, async (page) => {
     await page.evaluate(() => dispatchEvent(new Event('beforeprint')));
-    assert.equal(await page.locator('figure canvas.picture').count(), 13);
+    assert.equal(await page.locator('figure canvas.picture').count(), 9);
     assert.deepEqual(await blankCharts(page), []);
     assert.equal(await page.evaluate(() => document.documentElement.dataset.theme), 'light');
     await page.evaluate(() => dispatchEvent(new Event('afterprint')));
@@ -137,7 +137,7 @@ test('a print has every chart, in light colours, and leaves the screen as it was
 });
 
 test('20 000 evaluations and 20 years of days are drawn thinned and counted in full', async (context) => {
-  await withReport(sample.optimisation({ count: 20000, days: 7305 }), {}, async (page) => {
+  await withReport(sample.stretched(20000, 7305), {}, async (page) => {
     const [drawn, size] = await page.evaluate(() => [document.documentElement.dataset.drawn, document.documentElement.outerHTML.length]);
     context.diagnostic(`every chart drawn ${drawn} ms after the page was opened; ${(size / 1e6).toFixed(1)} million characters`);
     assert.deepEqual(await blankCharts(page), []);

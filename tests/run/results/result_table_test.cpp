@@ -3,6 +3,7 @@
 #include <bit>
 #include <cmath>
 #include <limits>
+#include <tuple>
 
 #include <gtest/gtest.h>
 
@@ -49,17 +50,14 @@ TEST(ResultTable, AFileCutAtAnyByteHoldsItsWholeRowsAndNoOther) {
 }
 
 TEST(ResultTable, OtherColumnsAreToldFromNone) {
-  const struct {
-    std::string header;
-    std::size_t rows;
-    std::size_t others;
-  } cases[] = {{"Evaluation\tStatus\tX2\tRMSE\tAggregate\n", 1, 0}, {"Evaluation\tStatus\tX1\tAggregate\n", 0, 1}};
-  for (const auto& c : cases) {
-    const ResultTable table = readResultTable(c.header + "1\tOK\t1\t2\t3\n2\tOK\t1\t2\n", kColumns);
+  const std::tuple<std::string, std::size_t, std::size_t> cases[] = {
+      {"Evaluation\tStatus\tX2\tRMSE\tAggregate\n", 1, 0}, {"Evaluation\tStatus\tX1\tAggregate\n", 0, 1}};
+  for (const auto& [header, rows, others] : cases) {
+    const ResultTable table = readResultTable(header + "1\tOK\t1\t2\t3\n2\tOK\t1\t2\n", kColumns);
     EXPECT_TRUE(table.hasHeader);
     EXPECT_FALSE(table.hasExpectedColumns);
-    EXPECT_EQ(table.rows.size(), c.rows);
-    EXPECT_EQ(table.rowsOfOtherColumns, c.others);
+    EXPECT_EQ(table.rows.size(), rows);
+    EXPECT_EQ(table.rowsOfOtherColumns, others);
     EXPECT_EQ(table.unusableLines, 1U);
   }
   EXPECT_TRUE(readResultTable("Evaluation\tStatus\tX1 \t RMSE\tAggregate\n", kColumns).hasExpectedColumns);

@@ -6,12 +6,11 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "matchers.h"
 #include "temporary_folder.h"
 
 namespace mirevo {
 namespace {
-
-using ::testing::ElementsAre;
 
 /// Records to `s_Series.dat` with a clock that the test sets; the period is the seconds 10 to 30.
 class SeriesRecorderTest : public ::testing::Test {
@@ -69,7 +68,7 @@ TEST_F(SeriesRecorderTest, InitialIsTheSetupsSetOrTheFirstThatSucceededWhateverT
   const SeriesTable read = table();
   ASSERT_EQ(read.series.size(), 1U);
   EXPECT_THAT(read.series[0].seconds, ElementsAre(10, 20, 30));  // its own and the observations' times in the period
-  EXPECT_THAT(read.series[0].observed, ElementsAre(1.0F, ::testing::NanSensitiveFloatEq(std::nanf("")), 3.0F));
+  EXPECT_THAT(read.series[0].observed, ElementsAre(1.0F, NanSensitiveFloatEq(std::nanf("")), 3.0F));
   EXPECT_THAT(read.series[0].initial, ElementsAre(9.0F, 9.0F, 9.0F));
   EXPECT_THAT(read.series[0].best, ElementsAre(3.0F, 3.0F, 3.0F));
 }

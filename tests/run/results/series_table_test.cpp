@@ -1,22 +1,17 @@
 #include "run/results/series_table.h"
 
 #include <cmath>
-#include <limits>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include "common/calendar.h"
+#include "matchers.h"
 
 namespace mirevo {
 namespace {
 
-using ::testing::ElementsAre;
 using ::testing::Eq;
-using ::testing::IsEmpty;
-using ::testing::NanSensitiveFloatEq;
-
-constexpr float kNaN = std::numeric_limits<float>::quiet_NaN();
 
 SeriesTable sample() {
   SeriesTable table;
@@ -24,7 +19,7 @@ SeriesTable sample() {
   table.initial = ShownEvaluation{2, 0.1};
   table.best = ShownEvaluation{1234, -1.0 / 3.0};
   const std::int64_t noon = secondNumber({2000, 2, 29, 12, 0, 1});
-  table.series = {{"flow, m3/s", {noon, noon + 86400}, {0.1F, kNaN}, {-1e-30F, 3e38F}, {kNaN, 16777217.0F}},
+  table.series = {{"flow, m3/s", {noon, noon + 86400}, {0.1F, NAN}, {-1e-30F, 3e38F}, {NAN, 16777217.0F}},
                   {"level", {noon}, {1.0F}, {2.0F}, {3.0F}}};
   return table;
 }
@@ -32,8 +27,8 @@ SeriesTable sample() {
 TEST(SeriesTable, ReadsBackWhatItHasWritten) {
   const SeriesTable table = sample();
   const std::string text = seriesTableText(table);
-  EXPECT_THAT(text, ::testing::HasSubstr("\nMeasure\tTime\tObserved\tInitial\tBest\n"
-                                         "flow, m3/s\t2000-02-29T12:00:01\t0.1\t-1e-30\tNaN\n"));
+  EXPECT_THAT(text, HasSubstr("\nMeasure\tTime\tObserved\tInitial\tBest\n"
+                              "flow, m3/s\t2000-02-29T12:00:01\t0.1\t-1e-30\tNaN\n"));
   const SeriesTable read = readSeriesTable(text);
   EXPECT_EQ(read.initial, table.initial);
   EXPECT_EQ(read.best, table.best);
@@ -41,9 +36,9 @@ TEST(SeriesTable, ReadsBackWhatItHasWritten) {
   ASSERT_EQ(read.series.size(), 2U);
   EXPECT_EQ(read.series[0].measure, "flow, m3/s");
   EXPECT_EQ(read.series[0].seconds, table.series[0].seconds);
-  EXPECT_THAT(read.series[0].observed, ElementsAre(0.1F, NanSensitiveFloatEq(kNaN)));
+  EXPECT_THAT(read.series[0].observed, ElementsAre(0.1F, NanSensitiveFloatEq(NAN)));
   EXPECT_THAT(read.series[0].initial, ElementsAre(-1e-30F, 3e38F));
-  EXPECT_THAT(read.series[0].best, ElementsAre(NanSensitiveFloatEq(kNaN), Eq(16777217.0F)));
+  EXPECT_THAT(read.series[0].best, ElementsAre(NanSensitiveFloatEq(NAN), Eq(16777217.0F)));
   EXPECT_THAT(read.series[1].best, ElementsAre(3.0F));
 }
 

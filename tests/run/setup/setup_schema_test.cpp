@@ -2,6 +2,7 @@
 
 #include <cstdlib>
 #include <set>
+#include <utility>
 
 #include <gtest/gtest.h>
 
@@ -73,14 +74,11 @@ TEST(SetupSchema, DefaultsAreThoseOfTheSettings) {
 }
 
 TEST(SetupSchema, NamesOfItemSectionsLoseTheirNumber) {
-  const struct {
-    const char* name;
-    const char* pattern;
-  } cases[] = {{"PARAMETER_1", "PARAMETER_n"},        {"PARAMETER_120", "PARAMETER_n"},
-               {"PARAMETER_01", "PARAMETER_01"},      {"PARAMETER_", "PARAMETER_"},
-               {"PARAMETER_1a", "PARAMETER_1a"},      {"SIMBATCH", "SIMBATCH"},
-               {"OUTPUT_MEASURES", "OUTPUT_MEASURES"}};
-  for (const auto& row : cases) EXPECT_EQ(itemPattern(row.name), row.pattern);
+  const std::pair<const char*, const char*> cases[] = {
+      {"PARAMETER_1", "PARAMETER_n"},        {"PARAMETER_120", "PARAMETER_n"}, {"PARAMETER_01", "PARAMETER_01"},
+      {"PARAMETER_", "PARAMETER_"},          {"PARAMETER_1a", "PARAMETER_1a"}, {"SIMBATCH", "SIMBATCH"},
+      {"OUTPUT_MEASURES", "OUTPUT_MEASURES"}};
+  for (const auto& [name, pattern] : cases) EXPECT_EQ(itemPattern(name), pattern);
 }
 
 TEST(SetupReference, TheManualSaysWhatTheProgramReads) {

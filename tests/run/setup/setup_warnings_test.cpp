@@ -2,11 +2,10 @@
 
 #include <gmock/gmock.h>
 
+#include "matchers.h"
+
 namespace mirevo {
 namespace {
-
-using testing::ElementsAre;
-using testing::StartsWith;
 
 TEST(UnusedParameterWarnings, FollowDependentParametersFromTheTemplatesOn) {
   std::vector<ModelParameter> parameters;

@@ -3,28 +3,24 @@
 #include <cctype>
 #include <cmath>
 #include <tuple>
+#include <utility>
 
 #include <fmt/format.h>
 #include <gmock/gmock.h>
 
+#include "matchers.h"
 #include "run/setup/run_keywords.h"
 #include "run/setup_fixture.h"
 
 namespace mirevo {
 namespace {
 
-using testing::HasSubstr;
-using testing::StartsWith;
 using ValidationTest = SetupFixture;
 
-struct Refused {
-  const char* edits;
-  std::string message;  ///< the first line behind "Error: ", whole
-  const char* detail;   ///< what the lines below it hold
-};
-
-const std::vector<Refused>& refusedValues() {
-  static const std::vector<Refused> cases = {
+TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
+  folder_.write("Setup.SH", "#!/bin/sh\n");
+  // The first line behind "Error: ", whole, and what the lines below it hold.
+  const std::tuple<const char*, std::string, const char*> cases[] = {
       // The model and its files
       {"TqSEKdxListItemCount = 1\n      [SIMBATCHITEM_1] => 0\n      [SIMBATCHITEM_1]",
        "No model simulation sequence defined", "setup.kdx:6:30: TqSEKdxListItemCount: expected 1 or more, found 0"},
@@ -32,6 +28,9 @@ const std::vector<Refused>& refusedValues() {
       {"'model\\run.sh' => 'model\\walk.sh'", "The file model\\walk.sh does not exist",
        "setup.kdx:8:25: BatchFileName: model/walk.sh: No such file or directory"},
       {"'model\\run.sh' => 'model'", "The file model does not exist", "Is a directory"},
+      {"'model\\run.sh' => 'Setup.SH'",
+       "Model simulation file and mirevo file are located in the same directory with an identical name",
+       "setup.kdx:8:25: BatchFileName: "},
       {"TqSEKdxListItemCount = 1 // files => 0", "No model parameter files defined", "setup.kdx:12:30"},
       {"'model/soil.par' => 'soil.par'", "The file soil.par is not located in the base folder ",
        "setup.kdx:14:25: ParamFileName"},
@@ -121,18 +120,14 @@ const std::vector<Refused>& refusedValues() {
       {"Algorithm_Type = 1 => 2 & Aggregation_Method = 0 => 2 & Weight = 0.75 => Standard_Deviation = 2.5",
        "Standard deviation and location not defined for objective function Flow", "Location: expected"},
   };
-  return cases;
-}
-
-TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
-  for (const Refused& row : refusedValues()) {
-    const std::string error = failure(row.edits);
+  for (const auto& [edits, wanted, detail] : cases) {
+    const std::string error = failure(edits);
     const std::string message = error.substr(0, error.find('\n'));
-    SCOPED_TRACE(row.edits);
+    SCOPED_TRACE(edits);
     // The base folder at the end of a message is this machine's.
-    EXPECT_THAT(message, StartsWith("Error: " + row.message));
-    EXPECT_TRUE(row.message.ends_with(' ') || message.size() == row.message.size() + 7) << message;
-    EXPECT_THAT(error.substr(std::min(error.size(), message.size() + 1)), HasSubstr(row.detail));
+    EXPECT_THAT(message, StartsWith("Error: " + wanted));
+    EXPECT_TRUE(wanted.ends_with(' ') || message.size() == wanted.size() + 7) << message;
+    EXPECT_THAT(error.substr(std::min(error.size(), message.size() + 1)), HasSubstr(detail));
     EXPECT_THAT(error, HasSubstr("\nsetup.kdx:")) << "every refusal names its place";
   }
 }
@@ -192,10 +187,7 @@ TEST_F(ValidationTest, RefusesNumbersOutsideTheRangeOfTheirRow) {
 
 // The fixed texts, by one value each: the rows above are held to themselves.
 TEST_F(ValidationTest, RefusesWithTheTextsThatUsersKnow) {
-  const struct {
-    const char* edits;
-    const char* error;
-  } cases[] = {
+  const std::pair<const char*, const char*> cases[] = {
       {"Transformation_Type = 1 => 3",
        "Transformation type invalid for parameter Depth\nsetup.kdx:29:29: Transformation_Type: expected 0 to 2, found "
        "3"},
@@ -238,7 +230,7 @@ TEST_F(ValidationTest, RefusesWithTheTextsThatUsersKnow) {
       {"Option = 2 => 3 & Standard_Deviation = 0.3 => 0.0", "Standard deviation in uncertainty estimation invalid\n"},
       {"NoSimultaneousSim = 4 => 0", "Invalid No. of processes\n"},
   };
-  for (const auto& row : cases) EXPECT_THAT(failure(row.edits), StartsWith(std::string("Error: ") + row.error));
+  for (const auto& [edits, error] : cases) EXPECT_THAT(failure(edits), StartsWith(std::string("Error: ") + error));
 }
 
 TEST_F(ValidationTest, CodesAreTakenByNumberOrByName) {
@@ -297,7 +289,9 @@ TEST_F(ValidationTest, CodesAreTakenByNumberOrByName) {
 }
 
 TEST_F(ValidationTest, AcceptsTheValuesAtTheEdgeOfWhatIsValid) {
+  folder_.write("setup.txt", "#!/bin/sh\n");  // an ending that no model setup has
   const char* const cases[] = {
+      "'model\\run.sh' => 'setup.txt'",
       "No_Points_Simplex = 5 => 20",
       "Algorithm_Type = 1 => 0 & NoSimultaneousSim = 4 => 1 & No_Points_Subcomplex = 6 => 7",
       "Algorithm_Type = 1 => 2 & NoSimultaneousSim = 4 => 1 & Perturbation_Parameter = 0.25 => 0",
@@ -326,15 +320,6 @@ TEST_F(ValidationTest, AcceptsTheValuesAtTheEdgeOfWhatIsValid) {
       "Option = 2 => 3 & Sample_Size = 200 => 2",
   };
   for (const char* edits : cases) EXPECT_EQ(failure(edits), "") << edits;
-}
-
-TEST_F(ValidationTest, RefusesAModelFileThatBearsTheNameOfTheSetup) {
-  folder_.write("Setup.SH", "#!/bin/sh\n");
-  EXPECT_THAT(failure("'model\\run.sh' => 'Setup.SH'"),
-              StartsWith("Error: Model simulation file and mirevo file are located in the same directory with an "
-                         "identical name\nsetup.kdx:8:25: BatchFileName: "));
-  folder_.write("setup.txt", "#!/bin/sh\n");
-  EXPECT_THAT(failure("'model\\run.sh' => 'setup.txt'"), "") << "an ending that no model setup has";
 }
 
 }  // namespace

@@ -6,35 +6,14 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "algorithms/function_evaluator.h"
+#include "matchers.h"
 #include "refusal.h"
 #include "run/tasks/optimisation_task.h"
 #include "run/tasks/scenario_task.h"
 
 namespace mirevo {
 namespace {
-
-using testing::DoubleEq;
-using testing::ElementsAre;
-
-/// Records what it is asked to evaluate; every result is good.
-class RecordingEvaluator final : public Evaluator {
- public:
-  std::vector<EvaluationResult> evaluateParameterSets(std::span<const ParameterSet> sets, DispatchMode) override {
-    batches.emplace_back(sets.begin(), sets.end());
-    std::vector<EvaluationResult> results(sets.size());
-    for (std::size_t i = 0; i < sets.size(); ++i) {
-      results[i].number = ++count_;
-      results[i].objectiveValues = {sets[i].front()};
-      results[i].aggregate = sets[i].front();
-    }
-    return results;
-  }
-
-  std::vector<std::vector<ParameterSet>> batches;
-
- private:
-  int count_ = 0;
-};
 
 ModelParameter parameter(const char* name, ParameterType type, TransformationType transformation) {
   ModelParameter result;
@@ -59,7 +38,7 @@ class TasksTest : public ::testing::Test {
                                           parameter("d", ParameterType::variable, TransformationType::integer)};
   std::vector<ObjectiveFunction> objectives_{1};
   SearchSpace space_ = BuildSearchSpace(parameters_);
-  RecordingEvaluator evaluator_;
+  testing::FunctionEvaluator evaluator_{[](const ParameterSet& set) { return testing::resultOf(set.front()); }};
   RunLog log_;
 };
 
@@ -94,7 +73,7 @@ TEST_F(TasksTest, AfterEverySearchItsBestSetIsTheFinalModelRun) {
   for (const CodeName& name : searchMethods().names()) {
     std::vector<std::vector<ParameterSet>> alone;
     for (const SurrogateUse use : {SurrogateUse::no, SurrogateUse::yes}) {
-      SCOPED_TRACE(testing::Message() << name.name << " " << static_cast<int>(use));
+      SCOPED_TRACE(::testing::Message() << name.name << " " << static_cast<int>(use));
       OptimisationTask task;
       task.method = searchMethods().make(SetupValue(std::string(name.name)));
       task.surrogateUse = use;
@@ -116,32 +95,6 @@ TEST_F(TasksTest, AfterEverySearchItsBestSetIsTheFinalModelRun) {
       if (use == SurrogateUse::no) alone = evaluator_.batches;
       if (task.method->facts().usesSurrogate) continue;
       EXPECT_EQ(evaluator_.batches, alone) << "a search that uses no surrogate model runs as it does alone";
-    }
-  }
-}
-
-/// Fails at a chosen step.
-class FailingSearch final : public SearchAlgorithm {
- public:
-  explicit FailingSearch(int goodSteps) : goodSteps_(goodSteps) {}
-  SearchStatus initialise() override { return step(); }
-  SearchStatus advance() override { return step(); }
-  bool isTerminated() const override { return goodSteps_ < -2; }
-  const SearchSummary& summary() const override { return summary_; }
-
- private:
-  SearchStatus step() { return goodSteps_-- > 0 ? kSearchOk : 3; }
-  int goodSteps_;
-  SearchSummary summary_;
-};
-
-TEST(RunSearch, AnyStepThatFailsIsFatalWithItsAlgorithmsText) {
-  for (const int goodSteps : {0, 1, 4}) {
-    for (const auto& [name, text] : {std::pair{"SCE", "Error: Invalid operation in SCE algorithm"},
-                                     {"PSE", "Error: Invalid operation in PSE algorithm"},
-                                     {"DDS", "Error: Invalid operation in DDS algorithm"}}) {
-      FailingSearch search(goodSteps);
-      EXPECT_EQ(refusalMessageOf([&, &algorithm = name] { runSearch(search, algorithm, {}); }), text);
     }
   }
 }
