@@ -8,7 +8,7 @@ namespace mirevo {
 class PopulationMethod : public SearchMethod {
  public:
   bool evaluatesSample(const InitialSampleSettings& sample) const final;
-  /// Continues behind a raised budget as if it had been so high from the start.
+  /// With a raised budget the search continues as if the budget had been that large from the start.
   RaisedBudget raiseBudget(const SearchHistory& history, const StoppingCriteria& stopping,
                            const InitialSampleSettings& sample) const final;
 };

@@ -10,9 +10,9 @@ namespace mirevo {
 
 /// The names of all searches, those with a number first.
 std::span<const CodeName> searchNames();
-/// The search of that number or name, with the default settings; nullptr when there is none.
+/// The search with this number or name, with the default settings; nullptr when there is none.
 std::unique_ptr<SearchMethod> makeSearchMethod(const SetupValue& value);
-/// Every search once, for the manual.
+/// One of each search, for the manual.
 std::vector<std::unique_ptr<SearchMethod>> searchMethods();
 
 }  // namespace mirevo

@@ -7,7 +7,7 @@
 
 namespace mirevo {
 
-// The sections that describe the model, its parameters, and how its runs are judged, with their keywords.
+// The sections that describe the model, its parameters and the assessment of its runs, with their keywords.
 
 const SettingSection<BatchItem>& batchItemSection();
 const SettingSection<ParameterFileItem>& parameterFileSection();
@@ -22,7 +22,7 @@ const SettingSection<ObjectiveFunction>& objectiveSection();
 const SettingSection<SavedOutputFile>& savedFileSection();
 const SettingSection<RunConfig>& measureFileSection();
 
-/// The section of a list: its count alone. `path` is below the target.
+/// The section of a list, which has only its count. `path` is below the target.
 const SectionRow& listSection(std::string_view path);
 
 }  // namespace mirevo

@@ -8,7 +8,7 @@
 
 namespace mirevo {
 
-/// Any other number runs no search.
+/// Any other number: no search is run.
 enum class SurrogateUse : std::int32_t { no = 0, yes = 1 };
 
 /// Parameter optimisation by one of the searches, with or without a surrogate model.
@@ -28,7 +28,7 @@ class OptimisationTask final : public Task {
   TaskReport report() const override;
   std::optional<RaisedBudget> raisedBudget(const SearchHistory& history) const override;
 
-  std::unique_ptr<SearchMethod> method;  ///< nullptr where the setup names none
+  std::unique_ptr<SearchMethod> method;  ///< nullptr if the setup names none
   SurrogateUse surrogateUse = SurrogateUse::no;
   InitialSampleSettings initialSample;
   StoppingCriteria stopping;
