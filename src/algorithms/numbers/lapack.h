@@ -7,7 +7,7 @@ void dpotrf_(const char* uplo, const int* n, double* a, const int* lda, int* inf
 /// Solves a·x = b for `rightSides` columns of b, with the factor of dpotrf.
 void dpotrs_(const char* uplo, const int* n, const int* rightSides, const double* a, const int* lda, double* b,
              const int* ldb, int* info);
-/// Overwrites the factor of dpotrf with the inverse (lower triangle).
+/// Overwrites the factor of dpotrf with the inverse, in the same triangle.
 void dpotri_(const char* uplo, const int* n, double* a, const int* lda, int* info);
 /// Exists only where OpenBLAS provides LAPACK.
 void openblas_set_num_threads(int count) __attribute__((weak));

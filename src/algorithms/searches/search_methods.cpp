@@ -14,7 +14,7 @@ std::unique_ptr<SearchMethod> makeOne() {
   return std::make_unique<Method>();
 }
 
-/// Every search: a new one is one more line here.
+/// All searches; a new one is added here.
 constexpr std::array kSearches = {makeOne<SceMethod>, makeOne<PseMethod>, makeOne<DdsMethod>};
 
 }  // namespace

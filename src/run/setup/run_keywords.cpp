@@ -7,7 +7,7 @@
 namespace mirevo {
 namespace {
 
-/// Rows of these settings bear on no result.
+/// For settings that do not affect the results.
 constexpr bool kNotOfResults = false;
 
 constexpr CodeName kRestartNames[] = {{0, "no"}, {1, "continue"}, {2, "continue and repeat failed runs"}};

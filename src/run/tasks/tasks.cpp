@@ -15,7 +15,7 @@ std::unique_ptr<Task> makeOne() {
   return std::make_unique<Form>();
 }
 
-/// Every task: a new one is one more line here.
+/// All tasks; a new one is added here.
 constexpr std::array kTasks = {makeOne<ScenarioTask>, makeOne<SensitivityTask>, makeOne<OptimisationTask>,
                                makeOne<UncertaintyTask>};
 
