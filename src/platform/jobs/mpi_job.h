@@ -6,9 +6,9 @@
 
 namespace mirevo {
 
-/// Joins the MPI job that a launcher has started; null if this process is alone. MPI is initialised only in a job of
-/// several processes, so that a plain run pays nothing for it. Throws FatalError like joinJob(). In a build without MPI
-/// it refuses jobs of several processes.
+/// Joins the MPI job that a launcher has started; null if this process is alone. MPI is initialised only under a
+/// launcher that does not say that it started a single process, so that a plain run pays nothing for it. Throws
+/// FatalError like joinJob(). In a build without MPI it refuses jobs of several processes.
 std::unique_ptr<Job> joinMpiJob();
 
 }  // namespace mirevo
