@@ -2,7 +2,7 @@
 // program from start to end, compared with a bare loop of posix_spawn and wait on the same batch; how well slots are
 // kept busy; and whether an evaluation takes longer the longer a run goes on.
 //
-//   overhead [FOLDER]...     folders to work in, one a file system to measure (default: /dev/shm and the temporary one)
+//   overhead [FOLDER]... folders to work in, one per file system (default: /dev/shm and the temporary folder)
 //
 // The three take turns in short rounds, so that other load on the machine affects all of them; each figure is the
 // median of the rounds, a ratio the median of their ratios. The model is the small one of the tests: it reads its

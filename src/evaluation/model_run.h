@@ -22,7 +22,7 @@ namespace mirevo {
 /// All that is needed to turn a parameter set into a result, except the parameters themselves. File names are absolute.
 struct ModelDescription {
   std::string baseFolder;
-  std::string fileTag;  ///< names the process folders, so that runs do not share one
+  std::string fileTag;  ///< name of the setup; part of the names of converted templates in process folders
   std::vector<ParameterFileItem> parameterFiles;
   std::vector<OutputMeasure> measures;
   std::string measureFile;  ///< output-measure file; empty when no measure is of interface type 1

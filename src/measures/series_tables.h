@@ -49,7 +49,7 @@ class SeriesTables final {
   std::vector<std::string> simulationNames_;
   std::vector<std::size_t> observationIndex_;  ///< one per measure, 0-based
   std::vector<std::size_t> simulationIndex_;
-  std::vector<bool> hadPairs_;                     ///< one a measure
+  std::vector<bool> hadPairs_;                     ///< one per measure
   std::vector<std::vector<int>> simulationItems_;  ///< one per simulation file: the item numbers in use
   std::vector<std::unique_ptr<TimeSeriesObject>> observations_;
   std::vector<std::unique_ptr<TimeSeriesObject>> simulations_;

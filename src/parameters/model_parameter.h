@@ -24,7 +24,7 @@ struct ModelParameter {
   double upperBound = 0.0;
   TransformationType transformationType = TransformationType::none;
   ParameterType parameterType = ParameterType::variable;
-  double idValue = 0.0;  ///< stands for the parameter in numeric-ID templates, such as 1.5E-035
+  double idValue = 0.0;  ///< denotes the parameter in numeric-ID templates, such as 1.5E-035
   std::string name;      ///< unique, at most 255 bytes, trailing blanks trimmed
   std::string equation;  ///< for a dependent parameter
   std::string comment;
