@@ -61,13 +61,6 @@ std::string unescaped(std::string_view text) {
   return result;
 }
 
-/// Replaces control characters: head lines are for people and are not read back.
-std::string onOneLine(std::string text) {
-  std::replace_if(
-      text.begin(), text.end(), [](char c) { return static_cast<unsigned char>(c) < ' '; }, ' ');
-  return text;
-}
-
 std::string cellText(const DataTable::Cell& cell) {
   struct Text {
     std::string operator()(std::int64_t number) const { return std::to_string(number); }

@@ -8,6 +8,8 @@
 #include <variant>
 #include <vector>
 
+#include "common/run_files.h"
+
 namespace mirevo {
 
 /// A table for programs to read: what a run found, typed and at full precision. As a file it is tab-separated text
@@ -15,7 +17,7 @@ namespace mirevo {
 struct DataTable {
   using Cell = std::variant<std::int64_t, double, std::string>;
 
-  std::string name;                    ///< "Covariance": its file is `<setup>_Covariance.dat`
+  RunFile file;
   std::vector<std::string> headLines;  ///< for people, without "# "
   std::vector<std::string> columns;
   std::vector<std::vector<Cell>> rows;  ///< one cell per column

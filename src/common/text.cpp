@@ -168,10 +168,16 @@ std::vector<std::string_view> splitLines(std::string_view text) {
   return lines;
 }
 
+std::string onOneLine(std::string_view text) {
+  std::string line(text);
+  std::replace_if(
+      line.begin(), line.end(), [](char c) { return static_cast<unsigned char>(c) < ' '; }, ' ');
+  return line;
+}
+
 std::string columnName(std::string_view name) {
-  std::string harmless(trim(name));
+  std::string harmless = onOneLine(trim(name));
   for (char& c : harmless) {
-    if (static_cast<unsigned char>(c) < ' ') c = ' ';
     if (c == '#') c = '_';   // would start a comment in the middle of the header row
     if (c == '"') c = '\'';  // would open a quoted field that swallows its neighbours
   }

@@ -56,6 +56,9 @@ std::vector<std::string_view> splitAt(std::string_view text, char separator,
 /// The lines of `text`, without their line ends (LF or CRLF); a last line without an end counts.
 std::vector<std::string_view> splitLines(std::string_view text);
 
+/// `text` with every control character, including line ends, replaced by a blank.
+std::string onOneLine(std::string_view text);
+
 /// A name as a column heading, without anything that a reader of tab-separated values could misread.
 std::string columnName(std::string_view name);
 

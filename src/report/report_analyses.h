@@ -27,7 +27,7 @@ std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, 
                                                        const SearchSpace& space, std::span<const ResultRow> rows);
 
 /// The covariance of the parameters that a finished sensitivity analysis has written beside its results; empty if there
-/// is none.
-std::optional<ReportedCovariance> reportedCovariance(const std::string& filePrefix);
+/// is none, or if its files cannot be read, with the reason in `fault`.
+std::optional<ReportedCovariance> reportedCovariance(const std::string& filePrefix, std::string& fault);
 
 }  // namespace mirevo

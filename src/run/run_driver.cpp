@@ -129,7 +129,7 @@ void RunDriver::buildModel() {
   aggregator_ = std::make_unique<ObjectiveAggregator>(config_.objectives, config_.aggregationMethod);
   // Before the process folders are made, so that a run that cannot be continued changes nothing.
   results_.emplace(config_, parameters_->searchSpace(), filePrefix_);
-  if (config_.task) config_.task->earlierSearches = results_->earlierSearches();
+  if (config_.task) config_.task->continueFrom(results_->earlierSearches());
   launcher_ = std::make_unique<PosixProcessLauncher>();
   signalState.haltProcesses = haltProcessesFromSignal;
   const int slotCount = state_.job->hasWorkers() ? 0 : config_.simultaneousSimulations;  // the master runs no model
@@ -338,8 +338,13 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
     state_.log.line(text);
     showMessage(text);
   }
-  closeResults({RunStage::failed, std::string(message), text});  // the run has failed already; the first reason counts
-  if (launcher_) launcher_->haltProcesses();                     // before the report, which takes time
+  try {
+    closeResults({RunStage::failed, std::string(message), text});  // the run has failed already; the first reason
+                                                                   // counts
+  } catch (const std::exception& error) {
+    state_.log.warning(std::string("The results may lack their end: ") + error.what());
+  }
+  if (launcher_) launcher_->haltProcesses();  // before the report, which takes time
   reportRun();
   return endEarly(message);
 }

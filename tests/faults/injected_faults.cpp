@@ -68,8 +68,8 @@ std::string kindOf(const std::string& path) {
   if (path == "basin._spi_") return "message file";
   if (path == "basin._kill_") return "kill file";
   if (isIn("calSimErr")) return "failed-run file";
-  if (isIn("basin_Failures")) return "failure table";
-  if (isIn("basin_Run.")) return "run record";
+  if (path.find("_Failures.") != std::string::npos) return "failure table";
+  if (path.find("_Run.") != std::string::npos) return "run record";
   for (const char* table : {"Covariance", "Correlation", "ParameterLimits", "Jacobian", "Sensitivities", "Quantiles",
                             "SampleCorrelation"}) {
     if (isIn(fmt::format("basin_{}.", table).c_str())) return "analysis table";
@@ -167,7 +167,7 @@ Expectation expectationOf(const Fault& fault, const FaultyRun& run) {
   // The kind of the setup file is looked at before anything is made beside it, the log included.
   expected.logMayLackMessage = kind == "run log" || (kind == "setup file" && fault.call.first == "stat");
   expected.mayFailEvaluation = kind == "simulated series" || kind == "starting processes" || kind == "batch log";
-  expected.mayBeToldInReport = (kind == "series file" || kind == "failure table") &&
+  expected.mayBeToldInReport = (kind == "series file" || kind == "failure table" || kind == "run record") &&
                                (fault.call.first == "read" || fault.call.first == "open-to-read");
   expected.mayBeToldBehindLog = kind == "message file";  // its last records follow the log's end
   // Making a folder goes on without knowing what is there, and fails for what is missing.

@@ -191,7 +191,7 @@ std::vector<DataTable> covarianceTables(const ParameterCovariance& covariance, c
   tables.push_back(
       matrixTable(run_files::kCorrelation, "Correlation of the parameters", names, covariance.correlation));
   DataTable& limits = tables.emplace_back();
-  limits.name = tableName(run_files::kParameterLimits);
+  limits.file = run_files::kParameterLimits;
   limits.headLines = {"Estimate, standard deviation and 95 % limits of each parameter, model scale"};
   limits.columns = {"Parameter", "Estimate", "StandardDeviation", "Lower95", "Upper95", "LeftOut"};
   const std::vector<ParameterLimits> found = parameterLimits(covariance, space, set);
@@ -208,7 +208,7 @@ std::vector<DataTable> covarianceTables(const ParameterCovariance& covariance, c
 DataTable jacobianTable(const LinearisedModel& model, const SearchSpace& space,
                         std::span<const ObservationLabel> observations) {
   DataTable table;
-  table.name = tableName(run_files::kJacobian);
+  table.file = run_files::kJacobian;
   table.headLines = {
       "Derivatives of the simulated values by the parameters, search scale; the residual is the simulated "
       "less the observed value, the weight that of its square"};

@@ -237,7 +237,7 @@ std::optional<LinearisedModel> linearise(const PerturbationPlan& plan,
 
 std::vector<DataTable> sensitivityTables(const LocalSensitivity& sensitivity, const AnalysisNames& names) {
   DataTable table;
-  table.name = tableName(run_files::kSensitivities);
+  table.file = run_files::kSensitivities;
   table.headLines = {
       "Derivatives on the search scale, and dimensionless: times the extent of the parameter, over the "
       "size of the output; the composite is their root mean square over all outputs of a kind"};

@@ -143,7 +143,7 @@ UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome) {
 
 std::vector<DataTable> uncertaintyTables(const UncertaintySummary& summary, const AnalysisNames& names) {
   DataTable table;
-  table.name = tableName(run_files::kQuantiles);
+  table.file = run_files::kQuantiles;
   table.headLines = {
       "Parameters on the search scale, of all sets drawn; measures and objective functions of those whose "
       "model run succeeded"};

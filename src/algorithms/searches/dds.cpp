@@ -176,10 +176,6 @@ BoundSection DdsMethod::section() {
   return {section, *this};
 }
 
-std::vector<SearchAdvice> DdsMethod::advice(std::size_t /*n*/) const {
-  return {};
-}
-
 std::string_view DdsMethod::budgetRefusal() const {
   return "Error: Maximum No. of model evaluations in DDS algorithm invalid";
 }
@@ -209,15 +205,16 @@ std::unique_ptr<SearchAlgorithm> DdsMethod::make(SearchProblem problem) const {
 }
 
 SearchSummary DdsMethod::run(SearchProblem problem, const PeriodicStep& /*periodicStep*/) const {
-  bool startsFromInitial = problem.initialSample.includeInitialParameters;
+  const std::vector<EarlierSearch> earlier = std::exchange(problem.earlierSearches, {});
+  const std::int32_t budget = problem.stopping.maxEvaluations;
   int made = 0;
-  for (const EarlierSearch& earlier : problem.earlierSearches) {
-    Dds search(settings, earlier.maxEvaluations - made, startsFromInitial, problem.bounds, problem.evaluator,
-               problem.random);
-    problem.bounds.initial = runSearch(search, facts().name.name, {}, earlier.lastEvaluation - made).best;
-    startsFromInitial = true;
-    made = earlier.lastEvaluation;
+  for (const EarlierSearch& search : earlier) {
+    problem.stopping.maxEvaluations = search.maxEvaluations;
+    problem.bounds.initial = runSearch(*make(problem), facts().name.name, {}, search.lastEvaluation - made).best;
+    problem.earlierSearches.push_back(search);
+    made = search.lastEvaluation;
   }
+  problem.stopping.maxEvaluations = budget;
   return SearchMethod::run(std::move(problem), {});
 }
 

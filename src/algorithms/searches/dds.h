@@ -78,7 +78,6 @@ class DdsMethod final : public SearchMethod {
  public:
   const SearchFacts& facts() const override;
   BoundSection section() override;
-  std::vector<SearchAdvice> advice(std::size_t n) const override;
   std::string_view budgetRefusal() const override;
   /// Random start points, unless it starts from the initial set.
   bool evaluatesSample(const InitialSampleSettings& sample) const override { return !sample.includeInitialParameters; }
@@ -86,7 +85,7 @@ class DdsMethod final : public SearchMethod {
   /// starts from the best parameter set of the earlier one, whose evaluations are kept.
   RaisedBudget raiseBudget(const SearchHistory& history, const StoppingCriteria& stopping,
                            const InitialSampleSettings& sample) const override;
-  /// The last of the searches that run() makes, with what the earlier ones have left of the budget.
+  /// The search that follows the earlier ones, with the rest of the budget.
   std::unique_ptr<SearchAlgorithm> make(SearchProblem problem) const override;
   /// Runs the earlier searches with smaller budgets first, each from the best set of the one before.
   SearchSummary run(SearchProblem problem, const PeriodicStep& periodicStep) const override;

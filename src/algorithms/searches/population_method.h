@@ -4,6 +4,10 @@
 
 namespace mirevo {
 
+struct SimplexSettings {
+  std::int32_t pointCount = 2;
+};
+
 /// What the searches with a population have in common.
 class PopulationMethod : public SearchMethod {
  public:
@@ -11,6 +15,9 @@ class PopulationMethod : public SearchMethod {
   /// With a raised budget the search continues as if the budget had been that large from the start.
   RaisedBudget raiseBudget(const SearchHistory& history, const StoppingCriteria& stopping,
                            const InitialSampleSettings& sample) const final;
+
+  /// The subcomplex of SCE and the simplex of PSE are one setting.
+  SimplexSettings simplex;
 };
 
 }  // namespace mirevo

@@ -28,6 +28,15 @@ constexpr std::string_view kSimplexKeyword = "No_Points_Simplex";
 constexpr std::string_view kContractionKeyword = "Prob_Contraction";
 constexpr std::string_view kSimplexRefusal = "Error: No. of points in a simplex in PSE algorithm invalid";
 
+/// That a simplex has no more points than the population.
+std::optional<SettingRefusal> validatePseControl(const PseMethod& method) {
+  const std::int32_t points = method.settings.populationSize;
+  if (method.simplex.pointCount <= points) return std::nullopt;
+  return SettingRefusal{
+      std::string(kSimplexRefusal), kSimplexKeyword,
+      fmt::format("expected at most the {} points of the population, found {}", points, method.simplex.pointCount)};
+}
+
 std::optional<SettingRefusal> validateProbabilities(const PseSettings& settings) {
   if (settings.reflectionProbability + settings.contractionProbability <= 1.0) return std::nullopt;
   return SettingRefusal{"Error: Sum of probabilities for reflection and contraction in PSE algorithm larger than 1",
@@ -175,7 +184,8 @@ const SearchFacts& PseMethod::facts() const {
                                       .longName = "Population Simplex Evolution",
                                       .runsInParallel = true,
                                       .usesSurrogate = true,
-                                      .drawsInitialSample = true};
+                                      .drawsInitialSample = true,
+                                      .needsRanges = true};
   return kFacts;
 }
 
@@ -212,14 +222,6 @@ BoundSection PseMethod::section() {
                                            "probability of an immediate mutation."}),
             [](const PseMethod& m) { return validateProbabilities(m.settings); })}}};
   return {section, *this};
-}
-
-std::optional<SettingRefusal> validatePseControl(const PseMethod& method) {
-  const std::int32_t points = method.settings.populationSize;
-  if (method.simplex.pointCount <= points) return std::nullopt;
-  return SettingRefusal{
-      std::string(kSimplexRefusal), kSimplexKeyword,
-      fmt::format("expected at most the {} points of the population, found {}", points, method.simplex.pointCount)};
 }
 
 std::vector<SearchAdvice> PseMethod::advice(std::size_t n) const {

@@ -23,9 +23,8 @@ struct PseSettings {
 /// are; every other point u has an offspring, and the q − 1 worst have two. For each, q − 1 distinct points better than
 /// u are drawn, the i-th best of the population's N with a probability proportional to N + 1 − i, as SCE draws those of
 /// a simplex of which u is the worst. Let g be their centroid. The step of a point, spread over generations, is
-///   the reflection g − a·(u − g);
-///   if that failed, the contraction g + c·(u − g);
-///   if both failed, a mutation, accepted even if worse: u is stuck.
+///   the reflection g − a·(u − g); when it has failed the contraction g + c·(u − g); when both have failed a mutation,
+///   accepted even if worse: u is stuck.
 /// A mutation that is due is made. Otherwise the reflection or contraction that is due is made with
 /// `reflectionProbability`, an immediate contraction with `contractionProbability`, and an immediate mutation with the
 /// remaining probability. The offspring replaces u if it is better. A new point begins a step. A mutation is normally
@@ -77,8 +76,5 @@ class PseMethod final : public PopulationMethod {
 
   PseSettings settings;
 };
-
-/// Refuses a simplex with more points than the population.
-std::optional<SettingRefusal> validatePseControl(const PseMethod& method);
 
 }  // namespace mirevo

@@ -14,6 +14,15 @@ constexpr std::string_view kPointsKeyword = "No_Points_Complex";
 constexpr std::string_view kSubcomplexKeyword = "No_Points_Subcomplex";
 constexpr std::string_view kSubcomplexRefusal = "Error: No. of points in a subcomplex in SCE algorithm invalid";
 
+/// That a subcomplex has no more points than its complex.
+std::optional<SettingRefusal> validateSceControl(const SceMethod& method) {
+  const std::int32_t points = method.settings.pointsPerComplex;
+  if (method.simplex.pointCount <= points) return std::nullopt;
+  return SettingRefusal{
+      std::string(kSubcomplexRefusal), kSubcomplexKeyword,
+      fmt::format("expected at most the {} points of a complex, found {}", points, method.simplex.pointCount)};
+}
+
 }  // namespace
 
 Sce::Sce(const SceSettings& settings, const SimplexSettings& simplex, SearchProblem problem)
@@ -142,8 +151,11 @@ ParameterSet Sce::mutation(const Complex& complex) {
 }
 
 const SearchFacts& SceMethod::facts() const {
-  static constexpr SearchFacts kFacts{
-      .name = {0, "SCE"}, .longName = "Shuffled Complex Evolution", .usesSurrogate = true, .drawsInitialSample = true};
+  static constexpr SearchFacts kFacts{.name = {0, "SCE"},
+                                      .longName = "Shuffled Complex Evolution",
+                                      .usesSurrogate = true,
+                                      .drawsInitialSample = true,
+                                      .needsRanges = true};
   return kFacts;
 }
 
@@ -175,14 +187,6 @@ BoundSection SceMethod::section() {
                             .refusal = "Error: No. of evaluation steps in SCE algorithm invalid",
                             .meaning = "Evolution steps of a complex between two shuffles; 2n + 1 is usual."})}}};
   return {section, *this};
-}
-
-std::optional<SettingRefusal> validateSceControl(const SceMethod& method) {
-  const std::int32_t points = method.settings.pointsPerComplex;
-  if (method.simplex.pointCount <= points) return std::nullopt;
-  return SettingRefusal{
-      std::string(kSubcomplexRefusal), kSubcomplexKeyword,
-      fmt::format("expected at most the {} points of a complex, found {}", points, method.simplex.pointCount)};
 }
 
 std::vector<SearchAdvice> SceMethod::advice(std::size_t n) const {

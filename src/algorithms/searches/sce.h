@@ -89,7 +89,4 @@ class SceMethod final : public PopulationMethod {
   SceSettings settings;
 };
 
-/// Refuses a subcomplex with more points than its complex.
-std::optional<SettingRefusal> validateSceControl(const SceMethod& method);
-
 }  // namespace mirevo

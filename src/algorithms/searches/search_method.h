@@ -17,11 +17,6 @@
 
 namespace mirevo {
 
-/// Number of points in a simplex: the subcomplex of SCE and the simplex of PSE are one setting.
-struct SimplexSettings {
-  std::int32_t pointCount = 2;
-};
-
 /// What is true of a search whatever its settings.
 struct SearchFacts {
   CodeName name;                    ///< in setups; the name is also used in messages and reports: "SCE"
@@ -29,6 +24,7 @@ struct SearchFacts {
   bool runsInParallel = false;      ///< its batches fill several slots
   bool usesSurrogate = false;       ///< a surrogate model can choose among its proposals
   bool drawsInitialSample = false;  ///< it begins with the sample that the section INITIAL_SAMPLE describes
+  bool needsRanges = false;         ///< it uses the range of each parameter, which must not be empty
 };
 
 /// A keyword whose value is small for the number of variable parameters: the search may end early.
@@ -67,7 +63,10 @@ class SearchMethod {
   /// Its section inside OPTIMISATION_ALGORITHM with its keywords, bound to this object's settings.
   virtual BoundSection section() = 0;
   /// Settings that are small for n variable parameters.
-  virtual std::vector<SearchAdvice> advice(std::size_t n) const = 0;
+  virtual std::vector<SearchAdvice> advice(std::size_t n) const {
+    static_cast<void>(n);
+    return {};
+  }
   /// The fixed text for a budget below 1, if the search has one of its own.
   virtual std::string_view budgetRefusal() const { return {}; }
   /// Whether it evaluates a sample from which the scale of the objective functions can be determined.
@@ -91,8 +90,6 @@ class SearchMethod {
   virtual std::unique_ptr<SearchAlgorithm> make(SearchProblem problem) const = 0;
   /// Makes the search and runs it from its start to its end. Throws what runSearch() throws.
   virtual SearchSummary run(SearchProblem problem, const PeriodicStep& periodicStep) const;
-
-  SimplexSettings simplex;
 };
 
 /// The least number of evaluations that the sample and `loops` loops after it make.

@@ -29,14 +29,16 @@ struct SurrogateSettings {
   SurrogateModelType modelType = SurrogateModelType::gaussianProcess;
   std::int32_t initialGenerations = 1;  ///< loops evaluated by the model alone
 };
-/// The section SURROGATE_MODEL_PARAMETERS.
-const SettingSection<SurrogateSettings>& surrogateSection();
+/// The section SURROGATE_MODEL_PARAMETERS, and the number of parameters of the model.
+struct SurrogateSection {
+  SurrogateSettings& surrogate;
+  std::size_t variableCount = 0;
+};
+const SettingSection<SurrogateSection>& surrogateSection();
 
-/// Refuses a given neighbourhood that is too small for the model in n parameters, or larger than the number of
-/// parameter sets evaluated before the model is used: `available`, those of the initial sample and the initial
-/// generations.
-std::optional<SettingRefusal> validateSurrogateControl(const SurrogateSettings& settings, std::size_t n,
-                                                       std::optional<double> available);
+/// Refuses a given neighbourhood that is larger than the number of parameter sets evaluated before the model is used:
+/// `available`, those of the initial sample and the initial generations.
+std::optional<SettingRefusal> validateSurrogateControl(const SurrogateSettings& settings, double available);
 
 /// "quadratic polynomial" or "Gaussian process".
 std::string_view surrogateModelName(const SurrogateSettings& settings);

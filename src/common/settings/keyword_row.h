@@ -63,6 +63,9 @@ constexpr ValueRange between(double lowest, double highest) {
 /// The default of an optional keyword that has no default value.
 inline constexpr std::string_view kNoDefault = "none";
 
+/// KeywordFacts::bearsOnResults of settings that do not affect the results.
+inline constexpr bool kNotOfResults = false;
+
 /// The codes of settings that mean no or yes.
 inline constexpr CodeName kNoYesNames[] = {{0, "no"}, {1, "yes"}};
 
@@ -83,7 +86,7 @@ struct KeywordFacts {
   /// Fixed text for a value outside the range; if it ends with a blank, the name of the item follows.
   std::string_view refusal = {};
   std::string_view unit = {};
-  std::string_view meaning = {};
+  std::string meaning = {};
   bool bearsOnResults = true;  ///< another value may change the results: a restart with one is refused
   int checkOrder = 0;          ///< values are checked in ascending order of this number, equal ones in reading order
 };
@@ -169,7 +172,7 @@ KeywordRow setting(FieldOf, KeywordFacts facts) {
   const KeywordType type = facts.type.value_or(
       std::is_same_v<Field, bool> || !facts.codes.empty() ? KeywordType::code : settings_detail::typeOf<Field>());
   if (std::is_same_v<Field, bool> && facts.codes.empty()) facts.codes = kNoYesNames;
-  return {facts, type, [](void* settings, const SetupValue& value) {
+  return {std::move(facts), type, [](void* settings, const SetupValue& value) {
             settings_detail::assign(FieldOf{}(*static_cast<Settings*>(settings)), value);
           }};
 }
@@ -178,17 +181,17 @@ KeywordRow setting(FieldOf, KeywordFacts facts) {
 template <auto Member, class Settings, class Field>
 KeywordRow memberSetting(Field Settings::*, KeywordFacts facts) {
   return setting<Settings>(
-      [](Settings & settings) -> auto& { return settings.*Member; }, facts);
+      [](Settings & settings) -> auto& { return settings.*Member; }, std::move(facts));
 }
 template <auto Member>
 KeywordRow setting(KeywordFacts facts) {
-  return memberSetting<Member>(Member, facts);
+  return memberSetting<Member>(Member, std::move(facts));
 }
 
 /// A coded row whose value is passed on as it was read, a number or a name: `take(settings, value)`.
 template <class Settings, class Take>
 KeywordRow choice(Take, KeywordFacts facts) {
-  return {facts, KeywordType::code,
+  return {std::move(facts), KeywordType::code,
           [](void* settings, const SetupValue& value) { Take{}(*static_cast<Settings*>(settings), value); }};
 }
 
@@ -200,6 +203,12 @@ KeywordRow checked(KeywordRow row, Check) {
     return Check{}(*static_cast<const Settings*>(settings));
   };
   return row;
+}
+
+/// A SectionRow::itemName that returns `nameOf(settings)`; `nameOf` is a lambda without captures.
+template <class Settings, class NameOf>
+auto itemName(NameOf) {
+  return [](const void* settings) -> std::string { return NameOf{}(*static_cast<const Settings*>(settings)); };
 }
 
 KeywordRow itemCount();

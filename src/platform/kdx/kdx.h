@@ -91,10 +91,18 @@ class KdxSection final {
   NameIndex sectionIndex_;
 };
 
+/// A text without quotes where a value was expected.
+struct KdxUnquotedText {
+  std::string text;
+  std::string keyword = {};                ///< the keyword whose value it should be
+  std::vector<std::string> sections = {};  ///< that contain the keyword, from the outside in
+};
+
 /// Why a KDX text cannot be read: the position of the first error, and what was expected there.
 struct KdxSyntaxError {
   KdxPosition position;
   std::string message;
+  std::optional<KdxUnquotedText> unquoted = {};  ///< if that is the fault
 };
 
 /// A parsed KDX text: its targets are the sections of `root`.

@@ -119,7 +119,8 @@ std::variant<KdxValue, KdxSyntaxError> readKdxValue(KdxCursor& cursor, char sepa
     return *std::move(number);
   }
   return KdxSyntaxError{
-      start, fmt::format("expected a number, a date or a text between quotes, found {}", quotedForMessage(item))};
+      start, fmt::format("expected a number, a date or a text between quotes, found {}", quotedForMessage(item)),
+      KdxUnquotedText{std::string(item)}};
 }
 
 std::optional<DateRecord> parseKdxDate(std::string_view text) {

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <filesystem>
+#include <span>
 #include <utility>
 
 #include <fmt/core.h>
@@ -12,15 +13,6 @@
 
 namespace mirevo {
 namespace {
-
-KdxDocument parsed(const std::string& fileName, std::string_view text) {
-  auto result = parseKdx(fileName, text);
-  if (const auto* error = std::get_if<KdxSyntaxError>(&result)) {
-    fatalError("Error: Unable to open " + fileName,
-               fmt::format("{}:{}:{}: {}", fileName, error->position.line, error->position.column, error->message));
-  }
-  return std::get<KdxDocument>(std::move(result));
-}
 
 /// A suggestion for a missing name: the nearest of the unknown names in the section.
 std::string didYouMean(std::string_view missing, const std::vector<std::string>& unknown) {
@@ -33,11 +25,31 @@ std::string inside(std::string_view path, std::string_view name) {
   return path.empty() ? std::string(name) : fmt::format("{}/{}", path, name);
 }
 
+/// What the keyword accepts, if a text without quotes was written for a coded value.
+std::string wantedInstead(const KdxUnquotedText& found, const SetupSchema& schema) {
+  std::string pattern;
+  for (const std::string& name : std::span(found.sections).subspan(1)) pattern = inside(pattern, itemPattern(name));
+  const KeywordRow* row = found.sections.front() == kSetupTarget ? schema.findKeyword(pattern, found.keyword) : nullptr;
+  if (row == nullptr || row->type != KeywordType::code) return {};
+  const std::span<const CodeName> codes = row->facts.codes;
+  return fmt::format("; {} takes {}{}", row->name(), wantedCode(codes), nearestCode(codes, found.text));
+}
+
+KdxDocument parsed(const std::string& fileName, std::string_view text, const SetupSchema& schema) {
+  auto result = parseKdx(fileName, text);
+  if (const auto* error = std::get_if<KdxSyntaxError>(&result)) {
+    fatalError("Error: Unable to open " + fileName,
+               fmt::format("{}:{}:{}: {}{}", fileName, error->position.line, error->position.column, error->message,
+                           error->unquoted ? wantedInstead(*error->unquoted, schema) : ""));
+  }
+  return std::get<KdxDocument>(std::move(result));
+}
+
 }  // namespace
 
 SetupFile::SetupFile(const std::string& fileName, std::string folder, std::string_view text, const SetupSchema& schema,
                      RunLog& log)
-    : document_(parsed(fileName, text)), folder_(std::move(folder)), schema_(schema), log_(log) {}
+    : document_(parsed(fileName, text, schema)), folder_(std::move(folder)), schema_(schema), log_(log) {}
 
 SetupSection SetupFile::target() {
   const SetupSection root(*this, document_.root, "", "");

@@ -104,23 +104,14 @@ Converted convertList(const KdxKeyword& keyword) {
 Converted convertCode(std::span<const CodeName> codes, const KdxValue& value) {
   if (const auto* integer = std::get_if<std::int32_t>(&value.value)) return SetupValue(*integer);
   const auto* text = std::get_if<std::string>(&value.value);
-  if (text == nullptr) return mismatch(KeywordType::code, value);
-  const std::string_view name = trim(*text);
+  const std::string_view name = text == nullptr ? std::string_view{} : trim(*text);
   for (const CodeName& code : codes) {
     if (!equalIgnoringCase(code.name, name)) continue;
     if (code.code) return SetupValue(*code.code);
     return SetupValue(std::string(code.name));
   }
-  std::vector<std::string> names;
-  std::string known;
-  for (const CodeName& code : codes) {
-    names.emplace_back(code.name);
-    known += (known.empty() ? "'" : ", '") + names.back() + "'";
-  }
-  const auto nearest = nearestName(name, names);
-  return SetupValueError{value.position,
-                         fmt::format("expected {} or one of the names {}, found {}{}", wanted(KeywordType::code), known,
-                                     found(value), nearest ? fmt::format(", did you mean '{}'?", *nearest) : "")};
+  return SetupValueError{value.position, fmt::format("expected {}, found {}{}", wantedCode(codes), found(value),
+                                                     nearestCode(codes, name))};
 }
 
 Converted convertOne(const KeywordRow& row, const KdxValue& value) {
@@ -154,6 +145,19 @@ std::string inQuotes(std::string_view text) {
 }
 
 }  // namespace
+
+std::string wantedCode(std::span<const CodeName> codes) {
+  std::string names;
+  for (const CodeName& code : codes) names += fmt::format("{}'{}'", names.empty() ? "" : ", ", code.name);
+  return fmt::format("{} or one of the names {}", wanted(KeywordType::code), names);
+}
+
+std::string nearestCode(std::span<const CodeName> codes, std::string_view written) {
+  std::vector<std::string> names;
+  for (const CodeName& code : codes) names.emplace_back(code.name);
+  const auto nearest = nearestName(written, names);
+  return nearest ? fmt::format(", did you mean '{}'?", *nearest) : "";
+}
 
 Converted convertSetupValue(const KeywordRow& row, const KdxKeyword& keyword) {
   if (row.type == KeywordType::realList) return convertList(keyword);

@@ -1,7 +1,8 @@
 #pragma once
 
-#include <optional>
+#include <span>
 #include <string>
+#include <string_view>
 #include <variant>
 
 #include "common/settings/keyword_row.h"
@@ -19,6 +20,11 @@ struct SetupValueError {
 /// a date as a date; no other type is converted. Texts lose trailing blanks. The name of a coded value becomes its
 /// number, if it has one.
 std::variant<SetupValue, SetupValueError> convertSetupValue(const KeywordRow& row, const KdxKeyword& keyword);
+
+/// What a coded keyword accepts: "an integer within 32 bits or one of the names 'SCE', 'PSE'".
+std::string wantedCode(std::span<const CodeName> codes);
+/// ", did you mean 'PSE'?" if a name is similar to what was written; else empty.
+std::string nearestCode(std::span<const CodeName> codes, std::string_view written);
 
 /// The default of a row, which must have one.
 SetupValue defaultSetupValue(const KeywordRow& row);

@@ -42,13 +42,6 @@ void requireSameSettings(const RestartSettings& then, const RestartSettings& now
   refuse(detail);
 }
 
-/// Sorts the rows by number and keeps each number once.
-void putInOrder(std::vector<ResultRow>& rows) {
-  std::stable_sort(rows.begin(), rows.end(), [](const auto& a, const auto& b) { return a.number < b.number; });
-  rows.erase(std::unique(rows.begin(), rows.end(), [](const auto& a, const auto& b) { return a.number == b.number; }),
-             rows.end());
-}
-
 /// The number of the last evaluation before which none is missing.
 int lastWithoutGap(std::span<const ResultRow> rows) {
   int last = 0;
@@ -80,7 +73,8 @@ void dropFailuresAtEnd(EarlierRun& run) {
 
 RestartFiles restartFiles(const std::string& filePrefix, const ResultFileNames& names) {
   return {runFilePath(filePrefix, names.results), runFilePath(filePrefix, names.restart),
-          runFilePath(filePrefix, names.simulatedValues)};
+          runFilePath(filePrefix, names.simulatedValues), runFilePath(filePrefix, names.record),
+          runFilePath(filePrefix, names.failures)};
 }
 
 std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunConfig& config,
@@ -123,11 +117,7 @@ std::map<int, EarlierEvaluations::Record> earlierRecords(
     record.result.measureValues = row.measures;
     record.result.objectiveValues = row.objectives;
     if (!row.ok) {
-      const auto failure = failures.find(row.number);
-      record.result.failure =
-          failure != failures.end()
-              ? failure->second
-              : EvaluationFailure{EvaluationFailure::Kind::notKnown, "failed in the earlier run", {}};
+      record.result.failure = failures.at(row.number);
     } else if (simulatedValues) {
       record.result.simulatedValues = std::move(simulatedValues->at(row.number));
     }

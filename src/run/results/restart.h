@@ -17,6 +17,8 @@ struct RestartFiles {
   std::string results;
   std::string settings;         ///< what the results depend on
   std::string simulatedValues;  ///< if the task uses them
+  std::string record;
+  std::string failures;
 };
 
 /// The paths of these files; `filePrefix` is folder and name of the setup.

@@ -101,7 +101,7 @@ std::string shownSection(const SettingIndex& index, std::string_view section) {
 
 RestartSettings restartSettings(const RunConfig& config) {
   RestartSettings result{config.resultSettings, {}, {}};
-  if (config.task) result.searches = config.task->earlierSearches;
+  if (config.task) result.searches = config.task->earlierSearches();
   std::unordered_map<std::string, FileMark> known;  // many measures may name one file
   for (const ResultSetting& setting : result.settings) {
     if (!namesAFileOfResults(setting) || setting.value.empty()) continue;

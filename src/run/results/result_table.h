@@ -26,4 +26,7 @@ struct ResultTable {
 /// count as unusable.
 ResultTable readResultTable(std::string_view text, const ResultColumns& columns);
 
+/// Sorts the rows by number; of several with the same number the first is kept.
+void putInOrder(std::vector<ResultRow>& rows);
+
 }  // namespace mirevo

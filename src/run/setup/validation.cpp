@@ -99,11 +99,12 @@ std::optional<SettingRefusal> validateTransformation(const ObjectiveFunction& fu
 }
 
 std::optional<SettingRefusal> validateProcessCount(const RunConfig& config) {
-  const bool mayRun = config.usesMpiWorkers || !config.task || config.task->runsInParallel();
-  if (mayRun || config.simultaneousSimulations <= 1) return std::nullopt;
-  return SettingRefusal{"Error: Use Population Simplex Evolution algorithm for application with multiple processors",
-                        kSlotsKeyword,
-                        fmt::format("expected 1 with this Algorithm_Type, found {}", config.simultaneousSimulations)};
+  if (config.usesMpiWorkers || !config.task || config.simultaneousSimulations <= 1) return std::nullopt;
+  const std::optional<OneSlotOnly> only = config.task->needsOneSlot();
+  if (!only) return std::nullopt;
+  return SettingRefusal{
+      std::string(only->refusal), kSlotsKeyword,
+      fmt::format("expected 1 with this {}, found {}", only->keyword, config.simultaneousSimulations)};
 }
 
 }  // namespace mirevo

@@ -68,7 +68,7 @@ void validateScenarioRun(std::span<const double> values, std::span<const ModelPa
 }  // namespace
 
 const TaskFacts& ScenarioTask::facts() const {
-  static constexpr TaskFacts kFacts{{0, "scenarios"}, run_files::kPlain};
+  static constexpr TaskFacts kFacts{{0, "scenarios"}, "scenario runs", run_files::kPlain};
   return kFacts;
 }
 

@@ -123,7 +123,7 @@ void addCovariance(const TaskContext& context, const LocalSensitivity& sensitivi
 }  // namespace
 
 const TaskFacts& SensitivityTask::facts() const {
-  static constexpr TaskFacts kFacts{{1, "sensitivity"}, run_files::kSensitivity};
+  static constexpr TaskFacts kFacts{{1, "sensitivity"}, "sensitivity analysis", run_files::kSensitivity};
   return kFacts;
 }
 
@@ -151,7 +151,6 @@ int SensitivityTask::plannedEvaluations(std::size_t variableCount) const {
 
 TaskOutcome SensitivityTask::run(const TaskContext& context) {
   TaskOutcome outcome{std::string(kEndOfTask)};
-  if (type != SensitivityType::local) return outcome;
   const LocalSensitivity sensitivity = localSensitivity(settings, context.space, context.evaluator);
   const AnalysisNames names = analysisNames(context);
   outcome.report = formatSensitivity(sensitivity, names);

@@ -3,6 +3,7 @@
 #include <cstdint>
 #include <functional>
 #include <memory>
+#include <optional>
 #include <span>
 #include <string>
 #include <string_view>
@@ -27,7 +28,8 @@ struct SensitivitySettings;
 
 /// What is true of a task whatever its settings.
 struct TaskFacts {
-  CodeName name;  ///< in setups; the name is also used in the run record and the report: "optimisation"
+  CodeName name;              ///< in setups; the name is also used in the run record and the report: "optimisation"
+  std::string_view longName;  ///< "parameter optimisation"
   ResultFileNames resultFiles;
 };
 
@@ -79,6 +81,12 @@ struct TaskReport {
   const SensitivitySettings* sensitivity = nullptr;  ///< for a local sensitivity analysis, else null
 };
 
+/// Why more than one slot is refused.
+struct OneSlotOnly {
+  std::string_view refusal;  ///< the fixed text
+  std::string_view keyword;  ///< the keyword whose value requires one slot
+};
+
 /// A task together with its settings: everything that a setup, a run, a restart or a report asks about it. One class
 /// per task, in a file pair of its own; tasks.cpp lists them.
 class Task {
@@ -109,8 +117,8 @@ class Task {
   virtual bool drawsRandomNumbers() const { return false; }
   /// Whether it uses the simulated values at the observation times, which the results then must hold.
   virtual bool keepsSimulatedValues() const { return false; }
-  /// Whether its batches fill several slots; if not, more than one slot is refused.
-  virtual bool runsInParallel() const { return true; }
+  /// Empty if its batches fill several slots.
+  virtual std::optional<OneSlotOnly> needsOneSlot() const { return std::nullopt; }
 
   /// Runs it. Throws FatalError and RunCancelled.
   virtual TaskOutcome run(const TaskContext& context) = 0;
@@ -119,9 +127,10 @@ class Task {
 
   /// For a search, what becomes of an earlier one with a smaller budget; empty if the budget was not raised.
   virtual std::optional<RaisedBudget> raisedBudget(const SearchHistory& history) const;
+  /// Tells a search which searches with smaller budgets, made by the earlier run, it continues.
+  virtual void continueFrom(std::vector<EarlierSearch> searches);
+  virtual std::vector<EarlierSearch> earlierSearches() const { return {}; }
 
-  /// For a search that continues others with smaller budgets: these. Set from the earlier run, not from the setup.
-  std::vector<EarlierSearch> earlierSearches;
   /// One setting for the initial sample and the uncertainty analysis.
   std::int32_t randomSeed = 1;
 };

@@ -31,7 +31,7 @@ std::vector<std::string> reportBands(const TaskContext& context, std::span<const
 }  // namespace
 
 const TaskFacts& UncertaintyTask::facts() const {
-  static constexpr TaskFacts kFacts{{3, "uncertainty"}, run_files::kPlain};
+  static constexpr TaskFacts kFacts{{3, "uncertainty"}, "uncertainty analysis", run_files::kPlain};
   return kFacts;
 }
 

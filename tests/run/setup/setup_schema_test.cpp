@@ -55,7 +55,8 @@ TEST(SetupSchema, DefaultsAreThoseOfTheSettings) {
   EXPECT_EQ(stopping.loopsConvergence, StoppingCriteria{}.loopsConvergence);
   EXPECT_EQ(stopping.minChange, StoppingCriteria{}.minChange);
   SurrogateSettings surrogate{-1, -1, SurrogateModelType{-1}, -1};
-  withDefaults({surrogateSection(), surrogate}, surrogate);
+  SurrogateSection filled{surrogate};
+  withDefaults({surrogateSection(), filled}, surrogate);
   EXPECT_EQ(surrogate.samplingRate, SurrogateSettings{}.samplingRate);
   EXPECT_EQ(surrogate.neighbourhoodSize, SurrogateSettings{}.neighbourhoodSize);
   EXPECT_EQ(surrogate.modelType, SurrogateSettings{}.modelType);
