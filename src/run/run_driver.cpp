@@ -339,8 +339,7 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
     showMessage(text);
   }
   try {
-    closeResults({RunStage::failed, std::string(message), text});  // the run has failed already; the first reason
-                                                                   // counts
+    closeResults({RunStage::failed, std::string(message), text});  // the first reason counts
   } catch (const std::exception& error) {
     state_.log.warning(std::string("The results may lack their end: ") + error.what());
   }

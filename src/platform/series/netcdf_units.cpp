@@ -66,8 +66,8 @@ std::optional<DateRecord> parseOrigin(std::string_view text) {
   return std::nullopt;
 }
 
-/// How many days the Julian calendar, in which every fourth year is a leap year, is behind the Gregorian one:
-/// 1582-10-05 is 1582-10-15 in the Gregorian calendar.
+/// How many days the Julian calendar, in which every fourth year is a leap year, is behind the Gregorian one: Julian
+/// 1582-10-05 is Gregorian 1582-10-15.
 std::int64_t daysBehind(const DateRecord& date) {
   const int lastFebruary = date[date_field::kYear] - (date[date_field::kMonth] <= 2 ? 1 : 0);
   return lastFebruary < 0 ? -2 : lastFebruary / 100 - lastFebruary / 400 - 2;
