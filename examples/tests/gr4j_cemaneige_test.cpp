@@ -36,8 +36,7 @@ struct ExpectedDay {
   double precipitation, pet, runoff, evapotranspiration, exchange, production, routing;
 };
 
-// Computed apart from this program from the equations as they are published, the unit hydrographs as sums over the
-// past.
+// Expected values computed separately from the published equations, with the unit hydrographs as sums over the past.
 TEST(Gr4j, FollowsThePublishedEquationsDayByDay) {
   const std::vector<std::pair<double, std::vector<ExpectedDay>>> cases{
       {0.8,
@@ -126,7 +125,7 @@ TEST(Model, RunsDryWithoutWeather) {
     total += day.runoff;
   }
   EXPECT_LT(results.back().runoff, 1e-3);
-  EXPECT_LT(total, 0.3 * 100.0 + 0.5 * 50.0);  // what the stores began with
+  EXPECT_LT(total, 0.3 * 100.0 + 0.5 * 50.0);  // the initial content of the stores
 }
 
 }  // namespace

@@ -12,11 +12,11 @@ struct SimplexSettings {
 class PopulationMethod : public SearchMethod {
  public:
   bool evaluatesSample(const InitialSampleSettings& sample) const final;
-  /// Continues behind a raised budget as if it had been so high from the start.
+  /// With a raised budget the search continues as if the budget had been that large from the start.
   RaisedBudget raiseBudget(const SearchHistory& history, const StoppingCriteria& stopping,
                            const InitialSampleSettings& sample) const final;
 
-  /// SCE's subcomplex and PSE's simplex are one setting.
+  /// The subcomplex of SCE and the simplex of PSE are one setting.
   SimplexSettings simplex;
 };
 

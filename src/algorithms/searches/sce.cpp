@@ -77,7 +77,7 @@ Sce::Subcomplex Sce::drawSubcomplex(const Complex& complex) {
 }
 
 /// Draws the subcomplex of a step. A surrogate model chooses the most promising of the reflections and contractions of
-/// several subcomplexes; it comes first, and its counterpart second.
+/// several subcomplexes; it is tried first, and its counterpart second.
 void Sce::chooseSubcomplex(Complex& complex) {
   const std::size_t count = proposalsPerRun();
   std::vector<Subcomplex> drawn;
@@ -96,9 +96,9 @@ void Sce::chooseSubcomplex(Complex& complex) {
   complex.second = chosen % 2 == 0 ? contraction(complex) : std::move(proposals[chosen - 1]);
 }
 
-/// With a surrogate model the complex that holds the best point tries first where the model predicts least, and what it
-/// would have tried first comes second. A minimum better than the best point takes that one's place: it says much about
-/// the valley, and nothing about the rest of the complex, which a worst point less would draw together.
+/// With a surrogate model the complex that holds the best point first tries the predicted minimum, and then what it
+/// would have tried first. A minimum that is better than the best point replaces that one and not the worst: it tells
+/// much about the valley and nothing about the rest of the complex, which the loss of its worst point would contract.
 void Sce::proposePredictedMinimum(Complex& complex) {
   std::vector<PredictedMinimum> minima = predictedMinima(std::span(complex.points).first(1));
   if (minima.empty()) return;

@@ -7,7 +7,7 @@
 namespace mirevo {
 
 const ChoiceTable<SearchMethod>& searchMethods() {
-  /// A new search is one more name here.
+  /// A new search is added here.
   static const auto searches = ChoiceTable<SearchMethod>::of<SceMethod, PseMethod, DdsMethod>();
   return searches;
 }

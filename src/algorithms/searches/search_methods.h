@@ -11,7 +11,7 @@ namespace mirevo {
 /// All searches.
 const ChoiceTable<SearchMethod>& searchMethods();
 
-/// The names of the searches of which a fact is true: "SCE or PSE" for " or " between them.
+/// The names of the searches for which `fact` is true, separated by `between`: "SCE or PSE" for " or ".
 std::string searchesWith(bool SearchFacts::*fact, std::string_view between);
 
 }  // namespace mirevo

@@ -16,14 +16,14 @@
 namespace mirevo {
 namespace {
 
-/// Of the width of a neighbourhood: places no farther apart in any coordinate are the same, and a second run tells
-/// nothing.
+/// As a fraction of the width of a neighbourhood: points that are closer in every coordinate count as the same, since a
+/// second run would tell nothing.
 constexpr double kSamePlace = 1.0e-3;
 
-/// Of a Gaussian process: the time for a fit grows with the third power of the neighbourhood.
+/// For a Gaussian process: the time for a fit grows with the third power of the size of the neighbourhood.
 constexpr std::size_t kMostNeighbours = 100;
 
-/// Stands for a prediction where a run is likely to fail: better only than that of a run made again.
+/// Replaces the prediction where a run is likely to fail: better only than kMadeAgain, for a run that would repeat one.
 constexpr double kLikelyToFail = std::numeric_limits<double>::max();
 constexpr double kMadeAgain = std::numeric_limits<double>::infinity();
 
@@ -134,7 +134,7 @@ std::size_t neighbourhoodSize(const SurrogateSettings& settings, std::size_t n) 
 }
 
 std::size_t leastSetCount(const SurrogateSettings& settings, std::size_t n) {
-  // Fewer than a plane needs say nothing about the shape of the objective.
+  // Fewer points than determine a plane tell nothing about the shape of the objective.
   return settings.modelType == SurrogateModelType::quadraticPolynomial ? quadraticCoefficientCount(n) : n + 2;
 }
 

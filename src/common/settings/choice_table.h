@@ -12,29 +12,30 @@
 
 namespace mirevo {
 
-/// The forms of a `Base` of which a setup chooses one by its number or name. `Base::facts()` has a form's `name` and
-/// `longName`, which are those of every object of the form.
+/// The classes derived from `Base` among which a setup chooses by number or name. `facts()` of a class gives its `name`
+/// and `longName`, which are the same for all objects of the class.
 template <class Base>
 class ChoiceTable final {
  public:
-  /// `ChoiceTable<SearchMethod>::of<SceMethod, PseMethod>()`: forms with a number first.
+  /// `ChoiceTable<SearchMethod>::of<SceMethod, PseMethod>()`; classes with a number first.
   template <class... Forms>
   static ChoiceTable of() {
     return ChoiceTable({makeOne<Forms>...});
   }
 
-  /// What setups call them.
+  /// Their numbers and names in setups.
   std::span<const CodeName> names() const { return names_; }
-  /// What the numbers and names mean, for the manual: "0 Shuffled Complex Evolution, 1 Population Simplex Evolution".
+  /// The meanings of the numbers and names, for the manual: "0 Shuffled Complex Evolution, 1 Population Simplex
+  /// Evolution".
   const std::string& meanings() const { return meanings_; }
-  /// The form of that number or name, with the default settings; nullptr when there is none.
+  /// An object of the class with this number or name, with the default settings; nullptr when there is none.
   std::unique_ptr<Base> make(const SetupValue& value) const {
     for (std::size_t i = 0; i < names_.size(); ++i) {
       if (isCode(names_[i], value)) return makers_[i]();
     }
     return nullptr;
   }
-  /// Every form once, with the default settings.
+  /// One object of each class, with the default settings.
   std::vector<std::unique_ptr<Base>> all() const {
     std::vector<std::unique_ptr<Base>> forms;
     for (const Maker maker : makers_) forms.push_back(maker());

@@ -23,7 +23,7 @@ bool isNameCharacter(char c) {
   return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') || c == '_' || c == '-' || c == '.';
 }
 
-/// Reads statement by statement; the open sections are a stack of its own, so that depth costs no call frames.
+/// Reads statement by statement, with its own stack of open sections instead of recursion.
 class KdxParser final {
  public:
   KdxParser(KdxDocument& document, std::string_view text) : cursor_(text) { open_.push_back(&document.root); }

@@ -9,7 +9,7 @@
 #include "common/text.h"
 #include "platform/kdx/kdx_value.h"
 
-// GCC 12 under the sanitizers takes the alternatives of a variant inside a variant for uninitialised.
+// With the sanitizers GCC 12 wrongly reports alternatives of a variant inside a variant as uninitialised.
 #if defined(__GNUC__) && !defined(__clang__)
 #pragma GCC diagnostic ignored "-Wmaybe-uninitialized"
 #endif
@@ -45,7 +45,7 @@ std::string found(const KdxValue& value) {
     std::string operator()(double number) const {
       const std::string text = formatReal(number);
       const bool isWhole = text.find_first_not_of("-0123456789") == std::string::npos;
-      return isWhole && parseInteger(text) ? text + ".0" : text;  // tells 2.0 from 2 where that is the fault
+      return isWhole && parseInteger(text) ? text + ".0" : text;  // shows 2.0 as different from 2
     }
     std::string operator()(const std::string& text) const { return "the text " + quotedForMessage(text); }
     std::string operator()(const DateRecord& date) const { return "the date " + formatDate(date); }
@@ -100,7 +100,7 @@ Converted convertList(const KdxKeyword& keyword) {
   return SetupValue(std::move(list));
 }
 
-/// A number is taken whatever it is: what it means, and whether it means anything, is for the keyword to say.
+/// Accepts any number; the range of the keyword is checked later.
 Converted convertCode(std::span<const CodeName> codes, const KdxValue& value) {
   if (const auto* integer = std::get_if<std::int32_t>(&value.value)) return SetupValue(*integer);
   const auto* text = std::get_if<std::string>(&value.value);

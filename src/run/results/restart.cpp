@@ -42,14 +42,14 @@ void requireSameSettings(const RestartSettings& then, const RestartSettings& now
   refuse(detail);
 }
 
-/// The last evaluation before which none is missing.
+/// The number of the last evaluation before which none is missing.
 int lastWithoutGap(std::span<const ResultRow> rows) {
   int last = 0;
   while (last < std::ssize(rows) && rows[static_cast<std::size_t>(last)].number == last + 1) ++last;
   return last;
 }
 
-/// What the search does with an earlier one of a smaller budget.
+/// Applies what the search does with an earlier one that had a smaller budget.
 void raiseBudget(const Task& task, int earlierBudget, EarlierRun& run) {
   const auto raised = task.raisedBudget({earlierBudget, lastWithoutGap(run.rows), run.searches});
   if (!raised) return;
@@ -60,7 +60,7 @@ void raiseBudget(const Task& task, int earlierBudget, EarlierRun& run) {
   if (!raised->note.empty()) run.notes.push_back(raised->note);
 }
 
-/// The failed model runs behind which no evaluation succeeded: whatever stopped the run may be put right by now.
+/// Drops the failed evaluations after the last successful one: their cause may have been removed since.
 void dropFailuresAtEnd(EarlierRun& run) {
   const auto isOk = [](const ResultRow& row) { return row.ok; };
   const auto end = std::find_if(run.rows.rbegin(), run.rows.rend(), isOk).base();
@@ -81,7 +81,7 @@ std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunCon
                                          const ResultColumns& columns, std::optional<RunRecord> record) {
   const auto text = readFileIfThere(files.results);
   ResultTable table = readResultTable(text.value_or(""), columns);
-  // More than a beginning that was cut off: there may be days of work behind a header row that cannot be read.
+  // Not just a cut-off beginning: there may be days of work below a damaged header row.
   if (!table.hasHeader && table.unusableLines > 1) refuse(files.results + " has no header row that can be read");
   if (table.rows.empty() && table.rowsOfOtherColumns == 0) return std::nullopt;
   const RestartSettings then = readSettings(files.settings);

@@ -14,7 +14,7 @@
 namespace mirevo {
 namespace {
 
-/// `text` as comment lines: one a line of it.
+/// The lines of `text` as comment lines.
 std::string commentLines(std::string_view text) {
   std::string lines;
   for (const std::string_view line : splitLines(text)) lines += fmt::format("# {}\n", line);
@@ -68,8 +68,8 @@ bool ResultFile::finish(std::span<const std::string> closingLines, std::string& 
   const bool isComplete = isInOrder() && aggregates_.empty();
   bool finished = isComplete ? file_.tryAppend(closing, reason) : rewriteInOrder(closing, reason);
   std::string again;
-  if (!finished && !isComplete) file_.tryAppend(closing, again);  // better out of order than without its end
-  // One that was put in order has another file in its place.
+  if (!finished && !isComplete) file_.tryAppend(closing, again);  // better out of order than without an end
+  // A file that was put in order has been replaced, so errors of the old descriptor do not matter.
   if (!file_.tryClose(again) && finished && isComplete) {
     reason = again;
     finished = false;

@@ -9,7 +9,7 @@
 namespace mirevo {
 namespace {
 
-/// Takes a row's line; false for one that is damaged.
+/// Reads the line of a row; false if it is damaged.
 bool takeRow(std::string_view line, std::size_t columnCount, const ResultColumns& columns, ResultTable& table) {
   if (!table.hasExpectedCount) {
     const bool isWhole = cellCount(line) == columnCount;

@@ -234,7 +234,7 @@ const SettingSection<OutputMeasure>& measureSection() {
              .refusal = "Error: Statistic type invalid for output measure ",
              .meaning = "Of the weighted differences simulated minus observed: 0 mean, 1 root mean square, 2 standard "
                         "deviation; weighted difference of 3 the largest, 4 the smallest values."}),
-        // One text for both weights on purpose; the location below it tells them apart.
+        // Deliberately the same text for both weights; the location below it shows which one is meant.
         setting<&Measure::weight>({.name = "Weight",
                                    .defaultValue = "1.0",
                                    .range = kNonNegative,

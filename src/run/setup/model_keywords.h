@@ -8,9 +8,9 @@
 
 namespace mirevo {
 
-// The sections that describe the model, its parameters, and how its runs are judged, with their keywords.
+// The sections that describe the model, its parameters and the assessment of its runs, with their keywords.
 
-/// An objective function, and the names of those before it.
+/// An objective function, and the names of the previous ones.
 struct ObjectiveSection {
   ObjectiveFunction& function;
   NamesUsed& names;
@@ -29,7 +29,7 @@ const SettingSection<ObjectiveSection>& objectiveSection();
 const SettingSection<SavedOutputFile>& savedFileSection();
 const SettingSection<RunConfig>& measureFileSection();
 
-/// The section of a list: its count alone. `path` is below the target.
+/// The section of a list, which has only its count. `path` is below the target.
 const SectionRow& listSection(std::string_view path);
 
 }  // namespace mirevo

@@ -28,7 +28,7 @@ SettingRefusal refuseRepeated(std::string_view message, const std::string& name,
 }  // namespace
 
 std::optional<SettingRefusal> validateParameterBounds(const ModelParameter& parameter) {
-  // First, as the initial value is outside such bounds whatever it is.
+  // Checked first, as every initial value is outside such bounds.
   if (parameter.lowerBound > parameter.upperBound) {
     return SettingRefusal{"Error: Lower bound larger than upper bound for parameter " + parameter.name, "Lower_Bound",
                           fmt::format("expected {} or less, found {}", parameter.upperBound, parameter.lowerBound)};
@@ -50,7 +50,7 @@ std::optional<SettingRefusal> validateParameterDefinition(const ModelParameter& 
   if (!names.insert(parameter.name).second) {
     return refuseRepeated("Error: Invalid parameter name", parameter.name, "Parameter_Name", "parameter");
   }
-  // The upper bound and the initial value are not below the lower bound.
+  // Only the lower bound matters: the upper bound and the initial value are not below it.
   const bool hasLogarithm =
       parameter.transformationType != TransformationType::logarithmic || parameter.lowerBound > 0.0;
   if (parameter.parameterType != ParameterType::variable || hasLogarithm) return std::nullopt;

@@ -36,7 +36,7 @@ const SettingSection<OptimisationTask>& optimisationSection() {
   return section;
 }
 
-/// An integer parameter always has a range.
+/// The range of an integer parameter is never empty.
 void refuseEmptyRanges(const TaskReading& reading) {
   for (std::size_t i = 0; i < reading.parameters.size(); ++i) {
     const ModelParameter& parameter = reading.parameters[i];
@@ -112,7 +112,7 @@ void OptimisationTask::readMethod(const TaskReading& reading, const SetupSection
   const BoundSection bound = method->section();
   const SetupSection control = section.open(nameInside(*bound.row));
   control.read(bound);
-  // Too small a population or simplex spans too few directions and ends early, away from the optimum.
+  // A population or simplex that is too small spans too few directions and converges early, away from the optimum.
   for (const SearchAdvice& advice : method->advice(reading.variableCount)) {
     if (advice.found >= advice.advised) continue;
     control.warn(advice.keyword, fmt::format("found {}, at least {} are advised for the number of variable parameters",
@@ -144,13 +144,13 @@ void OptimisationTask::readSurrogate(const TaskReading& reading, const SetupSect
   }
   const double available = evaluationsAfter(*method, surrogate.initialGenerations);
   control.require(validateSurrogateControl(surrogate, available));
-  // A budget that is spent before the surrogate model has enough evaluated sets is spent without it.
+  // Warns if the budget is used up before the surrogate model has enough evaluated sets.
   const auto sample = static_cast<double>(method->populationSize());
   const auto sets = static_cast<double>(leastSetCount(surrogate, reading.variableCount));
   const double initialLoops = surrogate.initialGenerations;
   const double before = std::max(sets, evaluationsAfter(*method, std::max(method->loopsBefore(sets), initialLoops)));
   const std::int32_t budget = stopping.maxEvaluations;
-  if (budget <= sample || budget > before) return;  // where there is no loop, the surrogate makes no difference
+  if (budget <= sample || budget > before) return;  // without a loop the surrogate would not be used anyway
   stoppingSection.warn(
       kBudgetKeyword,
       fmt::format("found {}, the surrogate model chooses nothing before {} model evaluations: it waits for "

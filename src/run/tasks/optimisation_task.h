@@ -8,7 +8,7 @@
 
 namespace mirevo {
 
-/// Any other number runs no search.
+/// Any other number: no search is run.
 enum class SurrogateUse : std::int32_t { no = 0, yes = 1 };
 
 /// Parameter optimisation by one of the searches, with or without a surrogate model.
@@ -30,7 +30,7 @@ class OptimisationTask final : public Task {
   void continueFrom(std::vector<EarlierSearch> searches) override { earlierSearches_ = std::move(searches); }
   std::vector<EarlierSearch> earlierSearches() const override { return earlierSearches_; }
 
-  std::unique_ptr<SearchMethod> method;  ///< nullptr before it is read, and never then
+  std::unique_ptr<SearchMethod> method;  ///< nullptr until it is read
   SurrogateUse surrogateUse = SurrogateUse::no;
   InitialSampleSettings initialSample;
   StoppingCriteria stopping;

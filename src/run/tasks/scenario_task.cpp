@@ -46,7 +46,7 @@ const SettingSection<ScenarioRun>& runSection() {
   return section;
 }
 
-/// The values of one run against the parameters.
+/// Checks the values of one run against the parameters.
 void validateScenarioRun(std::span<const double> values, std::span<const ModelParameter> parameters,
                          const SetupSection& section) {
   if (values.size() != parameters.size()) {

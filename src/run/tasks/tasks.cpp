@@ -8,7 +8,7 @@
 namespace mirevo {
 
 const ChoiceTable<Task>& tasks() {
-  /// A new task is one more name here.
+  /// A new task is added here.
   static const auto all = ChoiceTable<Task>::of<ScenarioTask, SensitivityTask, OptimisationTask, UncertaintyTask>();
   return all;
 }
