@@ -1,5 +1,5 @@
-// Reading a simulated series of ten hourly years (87,600 rows) from a CSV file, as it is done after every model run:
-// the program's reader beside a plain loop of fgets, sscanf and strtod.
+// Reading a simulated series of ten hourly years (87,600 rows) from a CSV file, as after every model run: the program's
+// reader compared with a plain loop of fgets, sscanf and strtod.
 
 #include <cstdio>
 #include <cstdlib>
@@ -64,7 +64,7 @@ void BM_CsvTimeSeries(benchmark::State& state) {
   state.SetItemsProcessed(state.iterations() * kRows);
 }
 
-/// The plain way: line by line, sscanf for the time, strtod for the value. It checks nothing but the order of times.
+/// The plain way: line by line, sscanf for the time, strtod for the value. Checks only the order of the times.
 void BM_PlainLoop(benchmark::State& state) {
   const int item = static_cast<int>(state.range(0));
   const std::string& path = sampleFile(item).path();
@@ -91,7 +91,7 @@ void BM_PlainLoop(benchmark::State& state) {
   state.SetItemsProcessed(state.iterations() * kRows);
 }
 
-/// The floor: the file's bytes alone.
+/// The lower limit: only reads the bytes of the file.
 void BM_ReadBytes(benchmark::State& state) {
   const std::string& path = sampleFile(static_cast<int>(state.range(0))).path();
   for (auto _ : state) {

@@ -1,4 +1,5 @@
-// Reading a setup must cost time in proportion to its length: the time per parameter of the three sizes is the same.
+// Reading a setup must take time proportional to its length: the time per parameter should be the same for all three
+// sizes.
 #include <string>
 #include <variant>
 

@@ -1,4 +1,5 @@
-// What the parameters cost: setting up a large model once, then mapping a set and writing a file for every model run.
+// The time for the parameters: setting up a large model once, then mapping a set and writing a file for every model
+// run.
 
 #include <filesystem>
 #include <string>
@@ -14,8 +15,8 @@
 namespace mirevo {
 namespace {
 
-/// `count` parameters of which the first `dependents` are dependent, each naming the next one: the order that they are
-/// set up in is the reverse of the one that they are computed in, the worst case of the ordering.
+/// `count` parameters, of which the first `dependents` are dependent and name the next one each: the order in the setup
+/// is the reverse of the order of evaluation, the worst case for the ordering.
 std::vector<ModelParameter> chain(std::size_t count, std::size_t dependents) {
   std::vector<ModelParameter> parameters(count);
   for (std::size_t i = 0; i < count; ++i) {

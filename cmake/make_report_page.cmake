@@ -1,11 +1,11 @@
-# Run with `cmake -D NODE=... -D NPM=... -D SOURCE=... -D FOLDER=... -D TEMPLATE=... -P`: makes TEMPLATE, the page in SOURCE
-# bundled with the packages that SOURCE/package-lock.json pins. FOLDER is shared by all presets and keeps the packages, in
-# node_modules, and the last page made: what was made of the same content is taken again. Builds at the same time wait
+# Run with `cmake -D NODE=... -D NPM=... -D SOURCE=... -D FOLDER=... -D TEMPLATE=... -P`: makes TEMPLATE, the page in
+# SOURCE bundled with the packages that SOURCE/package-lock.json pins. FOLDER is shared by all presets. It keeps the
+# packages, in node_modules, and the last page, which is used again if the content is the same. Simultaneous builds wait
 # for each other.
 file(MAKE_DIRECTORY ${FOLDER})
 file(LOCK ${FOLDER} DIRECTORY GUARD PROCESS TIMEOUT 600)
 
-# Sets `result` to whether `stamp` holds `content`.
+# Sets `result` to whether the file `stamp` contains `content`.
 function(is_stamped stamp content result)
   set(${result} FALSE PARENT_SCOPE)
   if(EXISTS ${stamp})

@@ -33,17 +33,22 @@ done < <(cd "$root/src" && find . -mindepth 1 -type d | sed 's|^\./||')
 
 checked=0
 while IFS=: read -r file line text; do
-  folder=$(dirname "${file#"$root"/src/}")
+  folder=${file#"$root"/src/}
+  folder=${folder%/*}
   target=${text#*\"}
-  target=${target%/*}
+  target=${target%%\"*}
   checked=$((checked + 1))
+  case "$target" in
+    */*) target=${target%/*} ;;
+    *) fault "$file:$line: $target must be included with its folder"; continue ;;
+  esac
   room=${roomOfFolder[$folder]-}
   wanted=${roomOfFolder[$target]-}
   case " ${allowed[$room]-} " in
     *" ${wanted:-none} "*) ;;
     *) fault "$file:$line: $folder must not include $target" ;;
   esac
-done < <(grep -rnE '^#include "[^"/]+/' "$root/src" --include='*.h' --include='*.cpp')
+done < <(grep -rnE '^\s*#\s*include\s*"' "$root/src" --include='*.h' --include='*.cpp')
 [ "$checked" -gt 0 ] || fault "no include was found below $root/src"
 
 while IFS=: read -r file line _; do

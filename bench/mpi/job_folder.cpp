@@ -1,7 +1,7 @@
 // mpi_job_folder FOLDER RUNS MILLISECONDS
 //
-// Writes a model, its observations and `basin.kdx` into the folder: scenario runs, as many as RUNS, of a model that
-// sleeps for so many milliseconds and computes next to nothing.
+// Writes a model, its observations and `basin.kdx` into the folder: RUNS scenario runs of a model that sleeps for
+// MILLISECONDS and computes next to nothing.
 
 #include <cstdio>
 #include <filesystem>

@@ -1,6 +1,6 @@
 #!/usr/bin/env bash
-# Measures MPI jobs of the built program on this machine, whose ranks all share its cores; the model sleeps, so that many
-# fit. Needs mpirun and the target mpi_job_folder. The figures in docs/clusters.md come from here.
+# Measures MPI jobs of the built program on this machine, with all ranks sharing its cores; the model sleeps, so that
+# many fit. Needs mpirun and the target mpi_job_folder. The figures in docs/clusters.md come from here.
 #
 #   bench/mpi/measure.sh [build folder] [another Mirevo to compare the start-up with]
 set -euo pipefail
@@ -12,13 +12,13 @@ trap 'rm -rf "$work"' EXIT
 cd "$work"
 export OMPI_MCA_btl=self,vader OMPI_MCA_btl_vader_single_copy_mechanism=none
 
-# As many model runs as the first argument, each sleeping as many milliseconds as the second.
+# Makes a folder with as many model runs as the first argument, each sleeping for the milliseconds of the second.
 write_setup() { "$build/mpi_job_folder" "$work" "$1" "$2"; }
 
 job() { mpirun --oversubscribe --allow-run-as-root --bind-to none -n "$1" "$build/Mirevo" basin.kdx; }
 
-# Seconds from the first row of the result file to the last one, and the number of rows between them: the job's start is
-# left out. The file is looked at every 10 ms.
+# Seconds from the first to the last row of the result file, and the number of rows in between, without the start of the
+# job. The file is checked every 10 ms.
 evaluation_rate() { # ranks
   rm -f basin*.dat
   job "$1" &
@@ -55,7 +55,7 @@ awk -v r="$rate" 'BEGIN { printf "200 runs of 100 ms on 1+8 ranks: %.1f a second
 write_setup 1 12000
 job 3 &
 sleep 3
-ticks() { # processor time of this job's ranks, in the order of their starts
+ticks() { # processor time of the ranks of this job, in order of start
   for process in $(pgrep -x Mirevo); do
     [ "$(readlink "/proc/$process/cwd")" != "$work" ] || awk '{ print $1, $14 + $15 }' "/proc/$process/stat"
   done

@@ -41,7 +41,7 @@ std::string constantSeries() {
   return text;
 }
 
-/// A section of a setup, from the parts of its content.
+/// A section of a setup with the parts of its content.
 std::string section(std::string_view name, std::initializer_list<std::string_view> parts) {
   return fmt::format("[{0}]\n{1}[/{0}]\n", name, fmt::join(parts, ""));
 }
@@ -69,7 +69,7 @@ std::string objectivesText() {
                           {kOneItem, section("OBJECTIVE_1", {"Name = 'all'\nFunction_Type = 0\nWeight = 1.0\n"})})});
 }
 
-/// A search of `count` evaluations, its final run included.
+/// A search of `count` evaluations, including its final run.
 std::string searchText(int count) {
   return section("OPTIMISATION_ALGORITHM",
                  {"Algorithm_Type = 2\nUse_Surrogate_Model = 0\n",

@@ -8,8 +8,7 @@
 
 namespace mirevo::bench {
 
-/// A calibration of the test model (365 values, two parameters) in a folder of its own, which can be evaluated in three
-/// ways over the same process folders' content.
+/// A calibration of the test model (365 values, two parameters) in a folder of its own, which can be run in three ways.
 class Calibration final {
  public:
   /// `fixedParameters` are further lines of the model's parameter file.
@@ -18,12 +17,12 @@ class Calibration final {
   Calibration(const Calibration&) = delete;
   Calibration& operator=(const Calibration&) = delete;
 
-  /// Seconds for that many runs of the batch by posix_spawn and wait alone.
+  /// Seconds for `count` runs of the batch by posix_spawn and wait alone.
   double runBare(int count);
-  /// Seconds for that many evaluations by a LocalEvaluator in this process, in one batch.
+  /// Seconds for `count` evaluations by a LocalEvaluator in this process, in one batch.
   double evaluate(int count);
-  /// Seconds per evaluation of the built program, its start and end included: a search by DDS in one slot (its final
-  /// run counted), an uncertainty analysis in several.
+  /// Seconds per evaluation of the built program, including its start and end: a search by DDS (with its final run) in
+  /// one slot, an uncertainty analysis in several.
   double runProgram(int count);
 
  private:

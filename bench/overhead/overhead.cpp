@@ -1,13 +1,13 @@
-// What the program adds to a model run: wall time per evaluation, of the evaluation loop in this process and of the
-// built program from start to end, against a bare loop that does posix_spawn and wait on the same batch; how well slots
-// are kept busy; and whether an evaluation costs more the longer a run goes on.
+// The overhead of the program: wall time per evaluation, for the evaluation loop in this process and for the built
+// program from start to end, compared with a bare loop of posix_spawn and wait on the same batch; how well slots are
+// kept busy; and whether an evaluation takes longer the longer a run goes on.
 //
-//   overhead [FOLDER]...     folders to work in, one a file system to measure (default: /dev/shm and the temporary one)
+//   overhead [FOLDER]... folders to work in, one per file system (default: /dev/shm and the temporary folder)
 //
-// The three take turns in short rounds, so that what else the machine does strikes all; each figure is the median of
-// its rounds, a ratio the median of the rounds' ratios. The model is the small one of the tests: it reads its parameter
-// file and writes 365 values. In the bare loop it truncates the file that its last run wrote, which the program has
-// removed.
+// The three take turns in short rounds, so that other load on the machine affects all of them; each figure is the
+// median of the rounds, a ratio the median of their ratios. The model is the small one of the tests: it reads its
+// parameter file and writes 365 values. In the bare loop it truncates the file of its last run, which the program would
+// have removed.
 #include <algorithm>
 #include <filesystem>
 #include <unistd.h>
@@ -24,7 +24,7 @@ using mirevo::bench::Calibration;
 
 constexpr int kRounds = 11;
 constexpr int kRunsARound = 200;
-constexpr int kProgramRuns = 600;  ///< more, as the start and end of the program count
+constexpr int kProgramRuns = 600;  ///< more, as the start and end of the program are included
 
 double median(std::vector<double> values) {
   std::sort(values.begin(), values.end());

@@ -1,6 +1,6 @@
 /// Prints the tables of docs/algorithms/search-comparison.md. Usage: search_comparison [table], where the table is
-/// "success", "budget", "complexes" or "surrogate"; all of them without an argument. Every trial has its own seed, 1,
-/// 2, 3, ..., so that the figures are the same on every run.
+/// "success", "budget", "complexes" or "surrogate"; without an argument all of them. Trials have the seeds 1, 2, 3,
+/// ..., so that the figures are the same every time.
 
 #include <algorithm>
 #include <functional>
@@ -57,7 +57,7 @@ double goldsteinPrice(const std::vector<double>& x) {
   return first * second;
 }
 
-/// The two-dimensional form with its smallest value −2.
+/// The two-dimensional form, with the minimum −2.
 double rastriginPlane(const std::vector<double>& x) {
   return x[0] * x[0] + x[1] * x[1] - std::cos(18.0 * x[0]) - std::cos(18.0 * x[1]);
 }
@@ -75,8 +75,8 @@ double shekel10(const std::vector<double>& x) {
   return sum;
 }
 
-/// The functions on which Duan, Sorooshian and Gupta (1993) report, with their bounds, and the ten-dimensional ones
-/// that are usual for comparing searches on a small budget.
+/// The functions of Duan, Sorooshian and Gupta (1993) with their bounds, and ten-dimensional ones that are usual for
+/// comparing searches with small budgets.
 std::vector<TestFunction> allFunctions() {
   using testing::cube;
   using testing::griewank;
@@ -126,22 +126,22 @@ enum class Method { sce, pse, dds };
 
 struct Setting {
   Method method = Method::sce;
-  int complexes = 2;  ///< the population is as many times 2n + 1 points, for PSE too
+  int complexes = 2;  ///< the population has this many times 2n + 1 points, for PSE, too
   int budget = kSuccessBudget;
-  int samplingRate = 100;  ///< below 100 with the surrogate model
+  int samplingRate = 100;  ///< per cent; below 100 with the surrogate model
   SurrogateModelType modelType = SurrogateModelType::quadraticPolynomial;
   bool stopsAtTarget = false;
-  int extraPoints = 0;               ///< points per complex beyond n + 1; 0: n, that is, 2n + 1 points
-  bool goesOnWhenConverged = false;  ///< up to the budget, whatever the stopping tests say
+  int extraPoints = 0;               ///< points per complex beyond n + 1; 0 means n, that is 2n + 1 points
+  bool goesOnWhenConverged = false;  ///< until the budget is used up, whatever the stopping tests say
 };
 
 struct Outcome {
   bool isSuccess = false;
-  int evaluations = 0;  ///< to the first value within the tolerance of the optimum
+  int evaluations = 0;  ///< until the first value within the tolerance of the optimum
   double best = 0.0;
 };
 
-/// Evaluates a function; counts the evaluations and notes when the value first came within a tolerance of the optimum.
+/// Evaluates a function; counts the evaluations and records when a value is first within the tolerance of the optimum.
 class TargetEvaluator final : public Evaluator {
  public:
   explicit TargetEvaluator(TestFunction function, double tolerance = 1.0e-3)
@@ -161,7 +161,7 @@ class TargetEvaluator final : public Evaluator {
   bool hasHitTarget() const { return evaluationsToTarget > 0; }
 
   int evaluations = 0;
-  int evaluationsToTarget = 0;  ///< 0 until the target is met
+  int evaluationsToTarget = 0;  ///< 0 until the target is reached
 
  private:
   TestFunction function_;
@@ -175,7 +175,7 @@ Outcome runTrial(const TestFunction& function, const Setting& setting, int seed)
   const int n = static_cast<int>(function.size());
   const SurrogateSettings surrogate{.samplingRate = setting.samplingRate, .modelType = setting.modelType};
   ProposalSelector selector(surrogate, bounds);
-  // The test of the objective's change is switched off by a history that is never filled.
+  // The test of the change of the objective is switched off by a history that is never filled.
   const StoppingCriteria stopping{setting.budget, 1000000000, 0.0};
   const SearchProblem problem{bounds,
                               stopping,

@@ -35,7 +35,7 @@ struct Worst {
   }
 };
 
-/// Draws arguments evenly on the logarithmic scale (linear = false) or on the linear one.
+/// Draws arguments uniformly on the logarithmic (linear = false) or the linear scale.
 void measure(const char* name, double from, double to, bool linear, int count,
              const std::function<double(double)>& ours, const std::function<Wide(double)>& truth) {
   mirevo::UniformGenerator random(1);

@@ -21,7 +21,7 @@ double sCurve2(double t, double x4) {
   return t < 2.0 * x4 ? 1.0 - 0.5 * std::pow(2.0 - t / x4, 2.5) : 1.0;
 }
 
-/// x (1 - (1 + (ratio)^4)^(-1/4)): what leaves a store of content x, of both percolation and routing.
+/// content (1 - (1 + ratio^4)^(-1/4)): the outflow of a store, for both percolation and routing.
 double storeOutflow(double content, double ratio) {
   const double squared = ratio * ratio;
   return content * (1.0 - 1.0 / std::sqrt(std::sqrt(1.0 + squared * squared)));
@@ -45,7 +45,7 @@ double SnowPack::advance(const Forcing& day) {
   water_ += solid;
   // Thermal state of the pack: eTG = min(0, CTG eTG + (1 - CTG) T).
   thermalState_ = std::min(0.0, ctg_ * thermalState_ + (1.0 - ctg_) * day.temperature);
-  // A pack at 0 degC melts by Kf (T - 0 degC), as far as there is any.
+  // A pack at 0 degC melts by Kf (T - 0 degC), as long as there is snow.
   double potentialMelt = 0.0;
   if (thermalState_ == 0.0 && day.temperature > 0.0) potentialMelt = std::min(water_, kf_ * day.temperature);
   // Melt slows down to a tenth as the cover becomes patchy: (0.9 G/Gthreshold + 0.1) of the potential.

@@ -8,8 +8,8 @@
 //   temperature-based snow-accounting routine? Part 2. Journal of Hydrology 517, 1176-1187.
 //   doi:10.1016/j.jhydrol.2014.04.059  -- "Valéry" below.
 //
-// The snow module has one band and not the usual five: the forcing is a mean over the catchment, and without the
-// catchment's distribution of altitudes there is nothing to tell five bands apart by.
+// The snow module has one elevation band instead of the usual five: the forcing is a mean over the catchment, and the
+// catchment's distribution of altitudes is not given.
 #pragma once
 
 #include <span>
@@ -28,29 +28,29 @@ struct Forcing {
 struct Parameters {
   double x1 = 350.0;  ///< capacity of the production store, mm, > 0
   double x2 = 0.0;    ///< groundwater exchange coefficient, mm/d, either sign
-  double x3 = 90.0;   ///< one day ahead capacity of the routing store, mm, > 0
+  double x3 = 90.0;   ///< one-day-ahead capacity of the routing store, mm, > 0
   double x4 = 1.7;    ///< time base of the first unit hydrograph, d, > 0
   double ctg = 0.25;  ///< weight of yesterday's thermal state of the snow pack, 0..1
   double kf = 4.0;    ///< degree-day melt factor, mm/degC/d, >= 0
 };
 
 /// Share of a day's precipitation that falls as snow, 0..1, by its lowest and highest temperature (Valéry's choice for
-/// catchments below 1500 m): all of it on a day without thaw, none on a day without frost, between the two as much as
-/// the day is below zero.
+/// catchments below 1500 m): all of it on a day without thaw, none on a day without frost, otherwise the fraction of
+/// the temperature range that is below 0 degC.
 double solidFractionOfRange(double tmin, double tmax);
 
-/// The same by the mean temperature alone, falling from 1 at -1 degC to 0 at 3 degC (the choice for higher catchments,
-/// after U.S. Army Corps of Engineers 1956, Snow Hydrology).
+/// The same from the mean temperature alone, decreasing from 1 at -1 degC to 0 at 3 degC (the choice for higher
+/// catchments, after U.S. Army Corps of Engineers 1956, Snow Hydrology).
 double solidFractionOfMean(double temperature);
 
 /// CemaNeige for one band.
 class SnowPack {
  public:
-  /// `meanAnnualSolidPrecipitation` in mm; 90 % of it is the pack from which on the whole area is taken as covered.
+  /// `meanAnnualSolidPrecipitation` in mm; with 90 % of it or more in the pack the whole area counts as covered.
   SnowPack(const Parameters& parameters, double meanAnnualSolidPrecipitation)
       : ctg_(parameters.ctg), kf_(parameters.kf), fullCover_(0.9 * meanAnnualSolidPrecipitation) {}
 
-  /// Takes a day's weather and gives the water that reaches the ground, rain and melt, mm.
+  /// Advances by one day; returns the water that reaches the ground, rain and melt, mm.
   double advance(const Forcing& day);
 
   double water() const { return water_; }  ///< snow water equivalent, mm
@@ -70,18 +70,18 @@ class UnitHydrograph {
  public:
   UnitHydrograph(double (*sCurve)(double, double), double x4, double timeBase);
 
-  /// Adds today's water and gives what arrives today, mm.
+  /// Adds today's water and returns what arrives today, mm.
   double advance(double water);
 
   std::span<const double> ordinates() const { return ordinates_; }
-  double stored() const;  ///< mm still under way
+  double stored() const;  ///< mm still on the way
 
  private:
   std::vector<double> ordinates_;
   std::vector<double> onTheWay_;  ///< mm, entry 0 arrives today
 };
 
-/// What one day did, mm.
+/// Fluxes of one day, mm.
 struct Fluxes {
   double runoff = 0.0;              ///< Q
   double evapotranspiration = 0.0;  ///< actual, interception included
@@ -102,17 +102,17 @@ class Gr4j {
   const UnitHydrograph& hydrograph2() const { return hydrograph2_; }
 
  private:
-  /// Interception, production store and percolation (eqs. 1-8); gives the water Pr that goes to the routing, mm.
+  /// Interception, production store and percolation (eqs. 1-8); returns the water Pr that goes to the routing, mm.
   double fillProductionStore(double precipitation, double pet, Fluxes& today);
 
   Parameters p_;
-  double production_;           ///< S, starts at 30 % of its capacity; a year of warm-up makes that forgotten
+  double production_;           ///< S, starts at 30 % of its capacity; a year of warm-up removes the effect
   double routing_;              ///< R, starts at 50 %
-  UnitHydrograph hydrograph1_;  ///< of the 90 % through the routing store
-  UnitHydrograph hydrograph2_;  ///< of the 10 % that bypass it
+  UnitHydrograph hydrograph1_;  ///< for the 90 % through the routing store
+  UnitHydrograph hydrograph2_;  ///< for the 10 % that bypass it
 };
 
-/// Mean snowfall of a year of 365.25 days, mm.
+/// Mean annual snowfall (365.25 days), mm.
 double meanAnnualSolidPrecipitation(std::span<const Forcing> days);
 
 struct DailyResult {

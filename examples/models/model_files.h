@@ -1,5 +1,5 @@
-// The text files of the example models: parameters in lines `name = value`, daily series as CSV. Every complaint begins
-// with the file's name and line.
+// The text files of the example models: parameters in lines `name = value`, daily series as CSV. Every error message
+// begins with the name and line of the file.
 #pragma once
 
 #include <map>
@@ -15,21 +15,21 @@ namespace models {
 /// The content of a file that must not be empty.
 std::string readFile(const std::string& name);
 
-/// Writes beside `name` and renames, so that whoever reads `name` never sees half of it.
+/// Writes a temporary file and renames it to `name`, so that nobody ever reads half of it.
 void writeFile(const std::string& name, const std::string& content);
 
-/// Appends a comma and the number in seven digits: as many as a reader that works in single precision can tell apart.
+/// Appends a comma and the number with seven significant digits, the resolution of single precision.
 void appendNumber(std::string& text, double value);
 
-/// The lines `name = value` of a parameter file; `#` begins a comment. Values are taken out one by one, so that what is
-/// left over is a name that nobody knows.
+/// The lines `name = value` of a parameter file; `#` begins a comment. Values are taken out one by one; names that are
+/// left over are unknown.
 class ParameterFile {
  public:
   explicit ParameterFile(const std::string& name);
 
-  /// Takes a number out; it must lie in lowest..highest.
+  /// Takes out a number, which must be in lowest..highest.
   double number(const std::string& key, double lowest, double highest);
-  /// Takes a date such as 2001-01-31 out, as text; `otherwise` when there is none.
+  /// Takes out a date such as 2001-01-31, as text; `otherwise` if there is none.
   std::string date(const std::string& key, const std::string& otherwise);
   void checkAllTaken() const;
 
@@ -42,7 +42,7 @@ class ParameterFile {
   std::map<std::string, Value> values_;
 };
 
-/// A CSV file, row by row: `#` lines, a header row, then the rows. Columns are found by their names, in any order.
+/// A CSV file, row by row: `#` lines, a header row, then the rows. Columns are identified by their names, in any order.
 class CsvFile {
  public:
   explicit CsvFile(const std::string& name);
@@ -50,7 +50,7 @@ class CsvFile {
   CsvFile& operator=(const CsvFile&) = delete;
 
   bool hasColumn(std::string_view column) const;
-  /// The column's index; complains when there is none of that name.
+  /// The index of a column; throws if there is none with this name.
   std::size_t column(std::string_view column) const;
 
   /// Goes to the next row that is not blank; false at the end.

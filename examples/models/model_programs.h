@@ -1,4 +1,4 @@
-// What the programs of the example models do, from their files to their files.
+// The programs of the example models, from input files to output files.
 #pragma once
 
 #include <string>
@@ -16,12 +16,12 @@ inline constexpr std::string_view kRiverHeader = "time,discharge_m3s,routed_m3s,
 ///   area_km2         catchment area
 ///   start, end       first and last day to simulate (2001-01-31); optional, else the whole forcing
 /// The forcing has the columns time, precipitation_mm, pet_mm and either tmin_degC and tmax_degC or temperature_degC,
-/// in any order, one row a day. The simulated file gets the columns of kCatchmentHeader.
+/// in any order, one row per day. The simulated file has the columns of kCatchmentHeader.
 void runCatchment(const std::string& parameterName, const std::string& forcingName, const std::string& simulatedName);
 
-/// The discharge at the lower end of a river: that of the catchment upstream routed by Muskingum, and what joins it on
-/// the way. The parameter file gives K [d] and X [-]; both discharges are columns discharge_m3s of files with the same
-/// days. The simulated file gets the columns of kRiverHeader.
+/// The discharge at the lower end of a river reach: the upstream discharge, routed by the Muskingum method, plus the
+/// lateral inflow. The parameter file gives K [d] and X [-]; both discharges are in columns discharge_m3s of files with
+/// the same days. The simulated file has the columns of kRiverHeader.
 void runRiver(const std::string& parameterName, const std::string& upstreamName, const std::string& lateralName,
               const std::string& simulatedName);
 

@@ -12,7 +12,7 @@ add_custom_command(OUTPUT ${series}
   COMMAND ${CMAKE_CURRENT_LIST_DIR}/prepare-data ${stage}
   VERBATIM)
 
-# A simulated series must exist when a run is set up: the model runs once, with the parameters that it comes with.
+# A simulated series must exist before a run, so the model is run once with its own parameters.
 add_custom_command(OUTPUT ${stage}/model/simulated.csv
   DEPENDS ${staged} ${series}
   COMMAND ./run.sh

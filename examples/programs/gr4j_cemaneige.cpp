@@ -1,6 +1,6 @@
 // A daily rainfall-runoff model, a program like any other that could be calibrated. models/model_programs.h describes
-// its files. The simulated file appears under its name only when it is complete. Exit code: 0, or 1 with one line of
-// explanation on standard error.
+// its files. The simulated file gets its name only when it is complete. Exit code: 0, or 1 with one line of explanation
+// on standard error.
 
 #include <cstdio>
 #include <exception>

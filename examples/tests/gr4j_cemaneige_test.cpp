@@ -22,8 +22,7 @@ TEST(SolidFraction, GoesFromAllToNothingAsTheDayThaws) {
 /// Precipitation, evapotranspiration that could be; runoff, evapotranspiration, exchange, both stores.
 using ExpectedDay = std::array<double, 7>;
 
-// Computed apart from this program from the equations as they are published, the unit hydrographs as sums over the
-// past.
+// Expected values computed separately from the published equations, with the unit hydrographs as sums over the past.
 TEST(Gr4j, FollowsThePublishedEquationsDayByDay) {
   const std::vector<std::pair<double, std::vector<ExpectedDay>>> cases{
       {0.8,

@@ -1,4 +1,4 @@
-// The example models from their files to their files: what is read, what is written and what is refused.
+// The programs of the example models: what they read, write and refuse.
 #include "models/model_programs.h"
 
 #include <algorithm>
@@ -14,7 +14,7 @@ namespace {
 
 class ModelFiles : public testing::Test {
  protected:
-  /// What is wrong with the run, without the folder; empty when it succeeds.
+  /// The error message of the run, without the folder; empty if it succeeds.
   template <typename Run>
   std::string complaint(Run run) const {
     try {

@@ -30,8 +30,8 @@ TEST(MuskingumRiver, RoutesThePublishedFlood) {
   }
 }
 
-// A day of 10 m3/s more: nothing is lost, nothing negative, and it comes K days later in the mean where a day is one
-// step.
+// One day with 10 m3/s more: no water is lost, no outflow is negative, and the pulse arrives K days later on average if
+// a day is one step.
 TEST(MuskingumRiver, KeepsTheWaterAndItsTravelTimeForAnyReach) {
   for (const double k : {0.01, 0.05, 0.17, 0.6, 1.0, 1.3, 4.0, 25.0}) {
     for (const double x : {0.0, 0.1, 0.2, 0.33, 0.4, 0.45, 0.49}) {
@@ -62,7 +62,7 @@ TEST(MuskingumRiver, TakesAsFewStepsAsItCan) {
       {4.0, 0.2, 1, 2},    // 1.6 <= 2 <= 6.4
       {0.25, 0.2, 3, 1},   // 0.3 <= 1 <= 1.2
       {0.1, 0.4, 9, 1},    // 0.72 <= 1 <= 1.08
-      {1.3, 0.45, 3, 4}};  // 1.17 and 1.43 hold no whole number; 2.34 and 2.86 none, 3.51 and 4.29 do
+      {1.3, 0.45, 3, 4}};  // no integer in 1.17..1.43 nor in 2.34..2.86, but in 3.51..4.29
   for (const auto& [k, x, steps, reaches] : cases) {
     const MuskingumRiver river(k, x);
     EXPECT_EQ(river.steps(), steps) << k;

@@ -15,7 +15,8 @@ awk -F '\t' '$1 == 1 { printf "one run with the initial values: %.2f %.2f\n", $(
 
 VOLK_PROGRESS=NONE "$1" "$folder/short.kdx" || { cat "$folder/short.log"; exit 1; }
 
-# The row of the best set, its aggregate by hand, and how the best of the initial sample stand to each other on the scale.
+# The row of the best set, its aggregate computed by hand, and the best values of the initial sample on the common
+# scale.
 best=$(awk -F '\t' '
   /^# Scale of / { scale = $0; gsub(/[^0-9.=]/, "", scale); split(scale, part, "="); n++; sigma[n] = part[2]; mu[n] = part[3] }
   /^[0-9]/ { count++; if ($2 != "OK") exit 1; a[count] = $(NF - 2); s[count] = $(NF - 1); f[count] = $NF }

@@ -2,8 +2,8 @@
 //
 //   series_statistics SIMULATED OBSERVED START END [SIMULATED_ITEM [OBSERVED_ITEM]]
 //
-// prints one line, for example `3287 values, NSE 0.871, KGE 0.823, RMSE 11.67, volume +6.0 %`. The files are those that
-// the program itself reads; missing observations are left out. START and END are days such as 1991-01-01, both
+// prints one line, for example `3287 values, NSE 0.871, KGE 0.823, RMSE 11.67, volume +6.0 %`. The file formats are
+// those of the program itself; missing observations are left out. START and END are days such as 1991-01-01, both
 // included. Items count from 1, the default.
 
 #include <cstdio>
@@ -26,7 +26,7 @@
 namespace mirevo::examples {
 namespace {
 
-/// The day that `text` names, such as 2001-01-31.
+/// Reads a day such as 2001-01-31.
 DateRecord parseDay(const std::string& text) {
   const auto year = parseInteger(text.substr(0, 4));
   const auto month = text.size() == 10 ? parseInteger(text.substr(5, 2)) : std::nullopt;

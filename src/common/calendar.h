@@ -15,7 +15,7 @@ namespace mirevo {
 using CalendarCycles =
     std::chrono::duration<std::int64_t, std::ratio_multiply<std::ratio<400>, std::chrono::years::period>>;
 
-/// Where days and seconds are counted from.
+/// The day from which days and seconds are counted.
 inline constexpr std::chrono::sys_days kFirstDay{std::chrono::year(0) / std::chrono::March / 1};
 
 /// Days in a month (1 to 12) of a year of the Gregorian calendar.
@@ -55,12 +55,12 @@ DateRecord dateOfSecond(std::int64_t second);
 /// "2001-01-31 12:30", with ":SS" where the seconds are not 0.
 std::string formatDate(const DateRecord& date);
 
-/// "2001-01-31T12:30:00" of a secondNumber(): the form that programs read.
+/// "2001-01-31T12:30:00" from a secondNumber(): the form that programs read.
 std::string isoTime(std::int64_t second);
 
-/// Takes a date without its time off the front of `text`: a year of 4 digits, or of `leastYearDigits` to 4, a month and
-/// a day of 1 or 2 each, "-" between them. The fields are taken apart and not judged: month 13 is a date here. Nothing
-/// where `text` begins otherwise; what was taken of it by then is lost.
+/// Takes a date without its time off the front of `text`: a year of `leastYearDigits` to 4 digits, a month and a day of
+/// 1 or 2 digits each, with "-" between them. The fields are not checked: month 13 is accepted here. Empty where `text`
+/// begins otherwise; what was taken off it by then is lost.
 std::optional<DateRecord> takeDay(std::string_view& text, std::size_t leastYearDigits = 4);
 
 }  // namespace mirevo

@@ -35,7 +35,7 @@ std::string escaped(std::string_view text) {
   return result;
 }
 
-/// The sign whose code stands in two hexadecimal digits at the start of `text`.
+/// The character whose code is given by the two hexadecimal digits at the start of `text`.
 std::optional<char> hexSign(std::string_view text) {
   const std::size_t high = text.size() < 2 ? std::string_view::npos : kHexDigits.find(text[0]);
   const std::size_t low = high == std::string_view::npos ? high : kHexDigits.find(text[1]);
@@ -59,13 +59,6 @@ std::string unescaped(std::string_view text) {
     }
   }
   return result;
-}
-
-/// A head line is for people and needs no more.
-std::string onOneLine(std::string text) {
-  std::replace_if(
-      text.begin(), text.end(), [](char c) { return static_cast<unsigned char>(c) < ' '; }, ' ');
-  return text;
 }
 
 std::string cellText(const DataTable::Cell& cell) {

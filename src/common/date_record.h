@@ -7,8 +7,8 @@ namespace mirevo {
 
 inline constexpr int kDateFieldCount = 9;
 
-/// A calendar date and time: year, month, day, hour, minute, then seconds in the sixth field; fields 7 to 9 are carried
-/// along unexamined. No time zone. Not necessarily valid: date_check() judges it.
+/// A calendar date and time: year, month, day, hour, minute, second; fields 7 to 9 are carried along unexamined. No
+/// time zone. Not necessarily valid: see isValidDate().
 using DateRecord = std::array<std::int32_t, kDateFieldCount>;
 
 namespace date_field {

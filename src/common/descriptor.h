@@ -6,7 +6,7 @@
 
 namespace mirevo {
 
-/// Closes a file descriptor at the end of its scope and leaves errno as it is. A negative number stands for no file.
+/// Closes a file descriptor at the end of its scope and leaves errno as it is. A negative number means no file.
 class Descriptor final {
  public:
   explicit Descriptor(int fd) : fd_(fd) {}
@@ -22,7 +22,7 @@ class Descriptor final {
   /// network file system may report only here that its disk is full.
   bool close() {
     const int fd = std::exchange(fd_, -1);
-    return fd < 0 || ::close(fd) == 0 || errno == EINTR;  // an interrupted one is closed all the same
+    return fd < 0 || ::close(fd) == 0 || errno == EINTR;  // after an interruption the file is closed all the same
   }
 
  private:

@@ -15,13 +15,13 @@ bool takesOutput(int descriptor, int patienceMilliseconds) {
   do {
     count = ::poll(&ready, 1, patienceMilliseconds);
   } while (count < 0 && errno == EINTR);
-  return count != 0;  // an error is what write(2) then says
+  return count != 0;  // after an error write(2) tells which
 }
 
 }  // namespace
 
 OutputResult writeWhole(int descriptor, std::string_view text, int patienceMilliseconds) {
-  // A pipe that takes anything takes this much without waiting, and in one piece.
+  // A pipe that accepts anything accepts this much without waiting, and in one piece.
   constexpr std::size_t kMostAtOnce = PIPE_BUF;
   const bool asksFirst = patienceMilliseconds != kAsLongAsItTakes;
   OutputResult result;

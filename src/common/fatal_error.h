@@ -21,7 +21,7 @@ class FatalError final : public std::exception {
   std::string detail_;
 };
 
-/// Thrown where a cancelled run stops; caught only by the run driver. `what()` is the message that was written.
+/// Thrown when a cancelled run stops; caught only by the run driver. `what()` is the message that was written.
 class RunCancelled final : public std::exception {
  public:
   explicit RunCancelled(const char* message = "Simulation cancelled") : message_(message) {}
@@ -31,8 +31,8 @@ class RunCancelled final : public std::exception {
   const char* message_;
 };
 
-/// Aborts the run: throws FatalError, which the run driver turns into the fixed order of the end (log, model
-/// processes, MPI, progress report, exit code 1). `detail` is written to the log as further lines below the message.
+/// Aborts the run: throws FatalError, after which the run driver ends the run in a fixed order (log, model processes,
+/// MPI, progress report, exit code 1). `detail` is written to the log as further lines below the message.
 [[noreturn]] void fatalError(std::string_view message, std::string_view detail = {});
 
 }  // namespace mirevo

@@ -18,7 +18,7 @@ namespace {
 
 constexpr std::size_t kCopyChunk = std::size_t{1} << 30;
 
-/// Whether `from` is a file to copy, of `status`; the reason in errno when it is not.
+/// Whether `from` is a regular file, with its `status`; if not, the reason is in errno.
 bool isFile(int from, struct stat& status) {
   if (from < 0 || ::fstat(from, &status) != 0) return false;
   if (S_ISREG(status.st_mode)) return true;
@@ -26,7 +26,7 @@ bool isFile(int from, struct stat& status) {
   return false;
 }
 
-/// False, with the reason in errno, when it fails.
+/// Writes the copy. False, with the reason in errno, when that fails.
 bool copyTo(const std::string& target, int from, const struct stat& status) {
   ::unlink(target.c_str());
   Descriptor to(::open(target.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, S_IRUSR | S_IWUSR));
@@ -45,7 +45,7 @@ bool copyContent(int from, int to) {
   while ((copied = ::copy_file_range(from, nullptr, to, nullptr, kCopyChunk, 0)) > 0) {
   }
   if (copied == 0) return true;
-  // Both calls advance the offsets only by what was copied, so the next way goes on where this one stopped.
+  // Both calls advance the offsets only by what was copied, so the next method continues where this one stopped.
   while ((copied = ::sendfile(to, from, nullptr, kCopyChunk)) > 0) {
   }
   return copied == 0;

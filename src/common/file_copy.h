@@ -4,18 +4,18 @@
 
 namespace mirevo {
 
-/// Copies what is left between the two files' offsets, by the cheapest way that the file systems know. False, with the
-/// reason in errno, when that fails.
+/// Copies from the offset of `from` to its end, to the offset of `to`, in the cheapest way that the file systems offer.
+/// False, with the reason in errno, when that fails.
 bool copyContent(int from, int to);
 
-/// Copies a regular file, its mode and its times to `target`, which is the whole copy as soon as it is there: it is
-/// written beside it, as `target` with ".part" behind, and renamed. False, with the system's reason, when that fails;
-/// it names the target where that, and not the source, is at fault.
+/// Copies a regular file with its mode and times. The copy is written as `target` + ".part" and renamed, so that
+/// `target` is complete as soon as it exists. False, with the system's reason, when that fails; the reason names the
+/// target if that, and not the source, is at fault.
 bool copyWhole(const std::string& source, const std::string& target, std::string& reason);
 
-/// Puts a file back that somebody removed while it was open, with all that was written to it; `descriptor`, opened for
-/// reading, too, then stands for the new one, at its end. Nothing happens to a file that is there. False, with the
-/// reason in errno, when that fails; EEXIST where another file has taken its place.
+/// Puts a file back that was removed while it was open, with all that was written to it; `descriptor`, which must be
+/// readable, too, then refers to the new file, at its end. Does nothing if the file is there. False, with the reason in
+/// errno, when that fails; EEXIST if another file has taken its name.
 bool putBackIfRemoved(int descriptor, const std::string& path);
 
 }  // namespace mirevo

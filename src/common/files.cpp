@@ -14,13 +14,13 @@
 namespace mirevo {
 namespace {
 
-/// Why something on disk is no file to read or write: reading a device or a pipe may never end. Empty for a file.
+/// Why something on disk is not a regular file: reading a device or a pipe may never end. Empty for a file.
 std::string faultOfKind(const struct stat& status) {
   if (S_ISREG(status.st_mode)) return {};
   return S_ISDIR(status.st_mode) ? std::strerror(EISDIR) : "Not a regular file";
 }
 
-/// Removes `path` and creates it anew with `content`, and with `mode` or, without one, as the umask has it.
+/// Removes `path` and creates it again with `content`, and with `mode` or, if there is none, according to the umask.
 bool createAnew(const std::string& path, std::string_view content, std::optional<unsigned> mode, bool isFlushed,
                 std::string& reason) {
   if (::unlink(path.c_str()) != 0 && errno != ENOENT) {

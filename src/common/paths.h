@@ -5,8 +5,8 @@
 
 namespace mirevo {
 
-/// What of `path` stands behind `folder` and its "/": "data/flow.csv", empty for the folder itself; nothing for a path
-/// that does not lie in it. Both are absolute and in normal form; links are not looked at.
+/// The part of `path` after `folder` and its "/": "data/flow.csv", an empty text for the folder itself; nothing for a
+/// path outside it. Both must be absolute and in normal form; links are not resolved.
 constexpr std::optional<std::string_view> pathInFolder(std::string_view path, std::string_view folder) {
   if (folder.ends_with('/')) folder.remove_suffix(1);
   if (!path.starts_with(folder)) return std::nullopt;

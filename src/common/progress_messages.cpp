@@ -32,7 +32,7 @@ std::optional<RunOrigin> readRunStarted(std::string_view message) {
   if (!takeText(message, kRunStarted)) return std::nullopt;
   RunOrigin origin;
   origin.startedAt = takeDateAndTimeWithZone(message);
-  const std::size_t hostEnd = message.rfind(kProcess);  // the name of a host may hold anything
+  const std::size_t hostEnd = message.rfind(kProcess);  // a host name may contain anything
   if (hostEnd == std::string_view::npos || !message.starts_with(kOnHost)) return origin;
   origin.host = message.substr(kOnHost.size(), hostEnd - kOnHost.size());
   message.remove_prefix(hostEnd + kProcess.size());

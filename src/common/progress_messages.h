@@ -5,8 +5,8 @@
 #include <string>
 #include <string_view>
 
-/// The texts by which a run tells a viewer how it is going: those who write them and those who read them find both
-/// here. docs/progress-format.md describes them.
+/// The texts by which a run tells a viewer how it is going, with the functions that write and read them.
+/// docs/progress-format.md describes them.
 namespace mirevo::progress {
 
 /// Kinds of records: what each line begins with.
@@ -18,22 +18,22 @@ inline constexpr std::string_view kSpeed = "COMSPD";
 inline constexpr std::string_view kTimeLeft = "TIMLFT";
 inline constexpr std::string_view kPercentage = "PROGRE";
 
-/// The first status of a run, and what its last one begins with: how it ended follows.
+/// The first status of a run, and the beginning of its last one, followed by how it ended.
 inline constexpr std::string_view kInitialisation = "Initialisation";
 inline constexpr std::string_view kEnded = "Ended: ";
 inline constexpr std::string_view kNormalTermination = "Normal termination";
-/// What the last two records of a run are, whole for signal handlers.
+/// For the last two records of a run; signal handlers need them whole.
 inline constexpr std::string_view kComplete = "100.0";
 inline constexpr std::string_view kEndedRecord = "STATUSEnded: ";
 inline constexpr std::string_view kCompleteRecord = "PROGRE100.0";
 static_assert(kEndedRecord.starts_with(kStatus) && kEndedRecord.ends_with(kEnded));
 static_assert(kCompleteRecord.starts_with(kPercentage) && kCompleteRecord.ends_with(kComplete));
 
-/// The label of what is counted, and what its planned number stands behind.
+/// The label of what is counted, and the text before the planned number.
 inline constexpr std::string_view kCountLabel = "Model evaluation";
 inline constexpr std::string_view kOfPlanned = " of ";
 
-/// The title of the setup stands behind it.
+/// Followed by the title of the setup.
 inline constexpr std::string_view kTitle = "Title: ";
 
 /// Who runs, where and since when.
@@ -42,9 +42,9 @@ struct RunOrigin {
   std::string host;
   std::int64_t process = 0;  ///< 0: not known
 };
-/// `startedAt` as dateAndTimeWithZone() says it.
+/// `startedAt` is in the form of dateAndTimeWithZone().
 std::string runStartedMessage(std::string_view startedAt, std::string_view host, std::int64_t process);
-/// Nothing for another message; what such a message does not say stays unknown.
+/// Empty for other messages; what the message does not say stays unknown.
 std::optional<RunOrigin> readRunStarted(std::string_view message);
 
 /// How an evaluation ended.
@@ -53,16 +53,15 @@ inline constexpr std::string_view kFailed = "FAILED";
 inline constexpr std::string_view kConstraintsViolated = "FAILED - parameter constraints violated";
 inline constexpr std::string_view kModelRunError = "FAILED - model run error";
 
-/// "Evaluation of parameter set No. 87": what all messages about it begin with.
+/// "Evaluation of parameter set No. 87": the beginning of all messages about it.
 std::string nameOfEvaluation(std::int64_t number);
 std::string initiatedMessage(std::int64_t number);
 std::string completedMessage(std::int64_t number, std::string_view outcome);
-/// Of one whose result was taken from an earlier run.
+/// For an evaluation whose result was taken from an earlier run.
 std::string replayedMessage(std::int64_t number, bool ok);
 
-/// What a message about an evaluation says of it.
 enum class EvaluationNews { underWay, succeeded, failed };
-/// Nothing for a message that is about no evaluation.
+/// Empty for a message that is not about an evaluation.
 std::optional<EvaluationNews> readEvaluationMessage(std::string_view message);
 
 struct BestEvaluation {
@@ -70,9 +69,9 @@ struct BestEvaluation {
   std::int64_t evaluation = 0;
   std::optional<double> foundAt;  ///< seconds since 1970-01-01 UTC
 };
-/// `foundAt` as dateAndTimeWithZone() says it; empty for one of an earlier run.
+/// `foundAt` is in the form of dateAndTimeWithZone(), or empty for an evaluation of an earlier run.
 std::string bestMessage(double aggregate, std::int64_t evaluation, std::string_view foundAt);
-/// Nothing for another message.
+/// Empty for other messages.
 std::optional<BestEvaluation> readBest(std::string_view message);
 
 }  // namespace mirevo::progress

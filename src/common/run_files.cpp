@@ -7,12 +7,12 @@ namespace {
 
 std::vector<RunFile> filesOfSetup() {
   using namespace run_files;
-  std::vector<RunFile> files{kLog,    kTerminationLog, kMessages, kKill,        kRecord,       kFailures,
-                             kSeries, kReport,         kBand,     kSavedFolder, kFailedFolder, kProcessFolder};
+  std::vector<RunFile> files{kLog,    kTerminationLog, kMessages,    kKill,         kSeries,
+                             kReport, kBand,           kSavedFolder, kFailedFolder, kProcessFolder};
   for (const ResultFileNames& names : {kPlain, kSensitivity, kOptimisation}) {
-    files.insert(files.end(), {names.results, names.restart, names.simulatedValues});
+    files.insert(files.end(), {names.results, names.restart, names.simulatedValues, names.record, names.failures});
+    files.insert(files.end(), names.tables.begin(), names.tables.end());
   }
-  files.insert(files.end(), kAnalysisTables.begin(), kAnalysisTables.end());
   return files;
 }
 
@@ -41,14 +41,6 @@ std::string failedRunsPath(std::string_view prefix) {
 
 std::string fileNameOf(std::string_view path) {
   return std::string(path.substr(path.rfind('/') + 1));
-}
-
-std::string tableName(const RunFile& file) {
-  return std::string(file.stem.substr(1));
-}
-
-std::string dataTablePath(std::string_view prefix, std::string_view tableName) {
-  return std::string(prefix).append("_").append(tableName).append(".dat");
 }
 
 }  // namespace mirevo

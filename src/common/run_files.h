@@ -19,11 +19,14 @@ struct RunFile {
   bool operator==(const RunFile&) const = default;
 };
 
-/// The files of one task's results: the table of evaluations, and what a run needs to be taken up again.
+/// What a run of one task leaves, so that a run of another task does not touch it.
 struct ResultFileNames {
-  RunFile results;
-  RunFile restart;
-  RunFile simulatedValues;
+  RunFile results;                  ///< the table of evaluations
+  RunFile restart;                  ///< the settings that they depend on
+  RunFile simulatedValues;          ///< of each evaluation, where the task works with them
+  RunFile record;                   ///< the account of the run
+  RunFile failures;                 ///< why evaluations failed
+  std::span<const RunFile> tables;  ///< in which the task gives what it found
 };
 
 /// The names of all that a run makes. Nothing else builds such a name.
@@ -33,8 +36,6 @@ inline constexpr RunFile kLog{"", ".log", false, true};
 inline constexpr RunFile kTerminationLog{"_Termination", ".log"};
 inline constexpr RunFile kMessages{"", "._spi_"};
 inline constexpr RunFile kKill{"", "._kill_"};
-inline constexpr RunFile kRecord{"_Run", ".dat", false, true};
-inline constexpr RunFile kFailures{"_Failures", ".dat", false, true};
 inline constexpr RunFile kSeries{"_Series", ".dat"};
 inline constexpr RunFile kReport{"_Report", ".html"};
 inline constexpr RunFile kBand{"_Band_", ".csv", true};
@@ -43,14 +44,7 @@ inline constexpr RunFile kSavedFolder{"_Saved", ""};
 inline constexpr RunFile kFailedFolder{"_Failed", "", true};
 inline constexpr RunFile kProcessFolder{"_Process", "", true};
 
-/// Scenario runs and the uncertainty analysis.
-inline constexpr ResultFileNames kPlain{{"", ".dat", false, true}, {"_Restart", ".dat"}, {"_Simulated", ".bin"}};
-inline constexpr ResultFileNames kSensitivity{
-    {"_Sensitivity", ".dat"}, {"_Sensitivity_Restart", ".dat"}, {"_Sensitivity_Simulated", ".bin"}};
-inline constexpr ResultFileNames kOptimisation{
-    {"_Optimisation", ".dat"}, {"_Optimisation_Restart", ".dat"}, {"_Optimisation_Simulated", ".bin"}};
-
-/// The tables in which analyses give what they found.
+/// Tables of analyses.
 inline constexpr RunFile kCovariance{"_Covariance", ".dat", false, true};
 inline constexpr RunFile kCorrelation{"_Correlation", ".dat", false, true};
 inline constexpr RunFile kParameterLimits{"_ParameterLimits", ".dat", false, true};
@@ -58,8 +52,19 @@ inline constexpr RunFile kJacobian{"_Jacobian", ".dat", false, true};
 inline constexpr RunFile kSensitivities{"_Sensitivities", ".dat", false, true};
 inline constexpr RunFile kQuantiles{"_Quantiles", ".dat", false, true};
 inline constexpr RunFile kSampleCorrelation{"_SampleCorrelation", ".dat", false, true};
-inline constexpr std::array kAnalysisTables{kCovariance,    kCorrelation, kParameterLimits,  kJacobian,
-                                            kSensitivities, kQuantiles,   kSampleCorrelation};
+inline constexpr std::array kUncertaintyTables{kQuantiles, kSampleCorrelation};
+inline constexpr std::array kSensitivityTables{kCovariance, kCorrelation, kParameterLimits, kJacobian, kSensitivities};
+
+/// Scenario runs and the uncertainty analysis.
+inline constexpr ResultFileNames kPlain{
+    {"", ".dat", false, true},          {"_Restart", ".dat"}, {"_Simulated", ".bin"}, {"_Run", ".dat", false, true},
+    {"_Failures", ".dat", false, true}, kUncertaintyTables};
+inline constexpr ResultFileNames kSensitivity{{"_Sensitivity", ".dat"},           {"_Sensitivity_Restart", ".dat"},
+                                              {"_Sensitivity_Simulated", ".bin"}, {"_Sensitivity_Run", ".dat"},
+                                              {"_Sensitivity_Failures", ".dat"},  kSensitivityTables};
+inline constexpr ResultFileNames kOptimisation{{"_Optimisation", ".dat"},           {"_Optimisation_Restart", ".dat"},
+                                               {"_Optimisation_Simulated", ".bin"}, {"_Optimisation_Run", ".dat"},
+                                               {"_Optimisation_Failures", ".dat"},  {}};
 
 /// Stands beside the setup without its name.
 inline constexpr RunFile kFailedRuns{"calSimErr", ".dat"};
@@ -77,10 +82,5 @@ std::string runFilePath(std::string_view prefix, const RunFile& file, int number
 std::string failedRunsPath(std::string_view prefix);
 /// The file's name without a folder, for messages: `calSimErr.dat`, `basin_Failures.dat`.
 std::string fileNameOf(std::string_view path);
-
-/// What a DataTable is called whose file this is: "Covariance".
-std::string tableName(const RunFile& file);
-/// The file of a DataTable of that name.
-std::string dataTablePath(std::string_view prefix, std::string_view tableName);
 
 }  // namespace mirevo

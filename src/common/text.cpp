@@ -18,7 +18,8 @@ char lowerAscii(char c) {
   return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c;
 }
 
-/// Whether a number outside the range of a double is too small for it (and so a zero) and not too large (and so none).
+/// Whether a number outside the range of a double is too small (and therefore counts as zero) rather than too large
+/// (and invalid).
 bool isTooSmall(std::string_view number) {
   if (const auto e = number.find_first_of("eE"); e != std::string_view::npos) {
     return e + 1 < number.size() && number[e + 1] == '-';
@@ -72,7 +73,7 @@ std::optional<double> parseReal(std::string_view text) {
     text.remove_prefix(1);
     if (!text.empty() && text.front() == '-') return std::nullopt;
   }
-  // from_chars would take "inf" and "nan", which are no values a user means.
+  // from_chars would accept "inf" and "nan", which no user means as a value.
   for (const char c : text) {
     const char lower = lowerAscii(c);
     if (!(c >= '0' && c <= '9') && c != '.' && c != '+' && c != '-' && lower != 'e' && lower != 'd') {
@@ -167,10 +168,16 @@ std::vector<std::string_view> splitLines(std::string_view text) {
   return lines;
 }
 
+std::string onOneLine(std::string_view text) {
+  std::string line(text);
+  std::replace_if(
+      line.begin(), line.end(), [](char c) { return static_cast<unsigned char>(c) < ' '; }, ' ');
+  return line;
+}
+
 std::string columnName(std::string_view name) {
-  std::string harmless(trim(name));
+  std::string harmless = onOneLine(trim(name));
   for (char& c : harmless) {
-    if (static_cast<unsigned char>(c) < ' ') c = ' ';
     if (c == '#') c = '_';   // would start a comment in the middle of the header row
     if (c == '"') c = '\'';  // would open a quoted field that swallows its neighbours
   }

@@ -23,16 +23,17 @@ std::string toLowerAscii(std::string_view text);
 bool equalIgnoringCase(std::string_view a, std::string_view b);
 
 /// The whole of `text` (blanks around it allowed) as a real number in any decimal or exponent form, `D` exponents and a
-/// leading `+` included; nothing when any of it is no number. "nan" and "inf" in any form are no numbers here.
+/// leading `+` included; empty when any part of it is not a number. "nan" and "inf" in any form are not numbers here.
 std::optional<double> parseReal(std::string_view text);
 
 /// The whole of `text` (blanks around it allowed) as a decimal integer within 32 bits.
 std::optional<std::int32_t> parseInteger(std::string_view text);
 
-/// The shortest decimal text that reads back as the same 64 bits ("NaN", "Inf", "-Inf" for the others).
+/// The shortest decimal text that reads back as the same 64 bits ("NaN", "Inf" and "-Inf" for values that are not
+/// finite).
 std::string formatReal(double value);
 
-/// The fixed texts with a number in them: `text` with its first "%" replaced by `number`.
+/// For fixed texts with a number in them: `text` with its first "%" replaced by `number`.
 std::string withNumber(std::string_view text, std::int64_t number);
 
 /// Whether this is a C0 control character other than a tab.
@@ -43,19 +44,22 @@ constexpr bool isControlCharacter(char c) {
 /// `text` between double quotes for a message: cut to a readable length, control characters replaced.
 std::string quotedForMessage(std::string_view text);
 
-/// The candidate nearest to `name` (Levenshtein distance, case ignored), for "did you mean"; nothing when none is
-/// closer than a third of the name's length, at least one edit.
+/// The candidate nearest to `name` (Levenshtein distance, case ignored), for "did you mean"; empty when none is within
+/// a third of the name's length, or one edit for short names.
 std::optional<std::string> nearestName(std::string_view name, std::span<const std::string> candidates);
 
-/// The parts of `text` between separators, one more than there are of these, and at most `mostParts`: the last of so
-/// many is all that is left.
+/// The parts of `text` between separators, one more than there are separators, but at most `mostParts`; the last of
+/// these is all that is left.
 std::vector<std::string_view> splitAt(std::string_view text, char separator,
                                       std::size_t mostParts = std::string_view::npos);
 
 /// The lines of `text`, without their line ends (LF or CRLF); a last line without an end counts.
 std::vector<std::string_view> splitLines(std::string_view text);
 
-/// A name as a column's heading: nothing in it that a reader of tab-separated values takes for something else.
+/// `text` with every control character, including line ends, replaced by a blank.
+std::string onOneLine(std::string_view text);
+
+/// A name as a column heading, without anything that a reader of tab-separated values could misread.
 std::string columnName(std::string_view name);
 
 }  // namespace mirevo

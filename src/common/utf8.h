@@ -14,10 +14,11 @@ struct Utf8Character {
   bool isValid = false;
 };
 
-/// The character that `text`, which is not empty, begins with: one invalid byte where it begins with none.
+/// The first character of `text`, which must not be empty; one invalid byte if it does not begin with a valid
+/// character.
 Utf8Character firstCharacter(std::string_view text);
 
-/// Whether this byte stands inside a character and does not begin one.
+/// Whether this byte continues a character and does not begin one.
 constexpr bool isInsideCharacter(char byte) {
   return (static_cast<unsigned char>(byte) & 0xC0U) == 0x80U;
 }

@@ -7,21 +7,22 @@
 
 namespace mirevo {
 
-/// The evaluation that a run holds for its best.
+/// The best evaluation of a run.
 struct BestEvaluation {
   int number = 0;
   double aggregate = 0.0;
   std::vector<double> parameterValues;  ///< model scale, one per variable parameter
 };
 
-/// Decides which evaluation of a run is its best: the one that the search took; without a search that with the smallest
-/// aggregate, of equals that with the smallest number. Evaluations come in any order.
+/// Decides which evaluation of a run is its best: the one that the search took; without a search the one with the
+/// smallest aggregate, of equals the one with the smallest number. Evaluations may come in any order.
 class BestChoice final {
  public:
-  /// An evaluation that succeeded; one whose aggregate is not known (NaN) is no candidate. Whether it is the best now.
+  /// Considers a successful evaluation; one whose aggregate is unknown (NaN) is not a candidate. Whether it is the best
+  /// now.
   bool consider(int number, double aggregate, std::span<const double> parameterValues);
-  /// A search knows which of equals it took, and its final model run only repeats it: no other is the best from here
-  /// on.
+  /// A search knows which of several equal evaluations it took, and its final model run only repeats that one: this
+  /// choice is final.
   void takeOfSearch(BestEvaluation best);
 
   const std::optional<BestEvaluation>& best() const { return best_; }
@@ -31,21 +32,21 @@ class BestChoice final {
   bool isOfSearch_ = false;
 };
 
-/// Decides which evaluation of a run is its initial one, against which others are shown: the first with the setup's
-/// initial values; without one the first that succeeded. Evaluations come in any order.
+/// Decides which evaluation of a run is its initial one, with which the best is compared: the first with the initial
+/// values of the setup; without one the first that succeeded. Evaluations may come in any order.
 class InitialChoice final {
  public:
   /// `setupValues`: the initial values of the variable parameters, model scale.
   explicit InitialChoice(std::vector<double> setupValues) : setupValues_(std::move(setupValues)) {}
 
-  /// An evaluation that succeeded, its values on the model scale. Whether it is the initial one now.
+  /// Considers a successful evaluation; its values are on the model scale. Whether it is the initial one now.
   bool consider(int number, std::span<const double> parameterValues);
-  /// Goes on from what was chosen before.
+  /// Restores the choice of an earlier run.
   void resume(int number, bool hasSetupValues);
 
-  /// Nothing before an evaluation has succeeded.
+  /// Empty before an evaluation has succeeded.
   const std::optional<int>& number() const { return number_; }
-  /// Whether that one has the setup's values; else it is the first that succeeded.
+  /// Whether it has the initial values of the setup; otherwise it is the first that succeeded.
   bool hasSetupValues() const { return hasSetupValues_; }
 
  private:

@@ -22,7 +22,7 @@ std::optional<EvaluationResult> EarlierEvaluations::take(int number, std::span<c
   EvaluationResult result = std::move(found->second.result);
   records_.erase(found);
   result.number = number;
-  // The transformation may have been settled only after the evaluation was recorded, or be settled again below.
+  // The transformation may have become known only after the evaluation was recorded, or may be determined again.
   result.aggregate = result.ok() ? aggregator_.aggregate(result.objectiveValues) : kFailedRunValue;
   return result;
 }
@@ -31,7 +31,7 @@ void EarlierEvaluations::requireSameValues(int number, std::span<const double> e
                                            std::span<const double> set) const {
   const std::vector<double> values = ToModelScale(space_, set);
   for (std::size_t i = 0; i < values.size(); ++i) {
-    // Bit for bit: a value that differs in its last place is the sign of another sequence of random numbers.
+    // Bit for bit: a difference in the last digit is a sign of another sequence of random numbers.
     if (std::bit_cast<std::uint64_t>(values[i]) == std::bit_cast<std::uint64_t>(earlier[i])) continue;
     fatalError("Error: Unable to continue the earlier run",
                fmt::format("evaluation No. {} has {} = {} in the earlier results, and {} now, though the settings are "

@@ -11,21 +11,21 @@
 
 namespace mirevo {
 
-/// What an earlier, interrupted run of the same setup has found. Every task is deterministic: taking its results from
-/// here, a run walks through the past of the earlier one without a model run and goes on where that was cut off.
+/// The results of an earlier, interrupted run of the same setup. Every task is deterministic: by taking these results a
+/// run repeats the course of the earlier one without model runs and continues where that was cut off.
 class EarlierEvaluations final {
  public:
   struct Record {
-    std::vector<double> parameterValues;  ///< model scale, one a variable parameter
-    EvaluationResult result;              ///< with every value but the aggregate
+    std::vector<double> parameterValues;  ///< model scale, one per variable parameter
+    EvaluationResult result;              ///< complete except for the aggregate
   };
 
-  /// `records` by their evaluation number. The aggregator must outlive this.
+  /// `records` by evaluation number. The aggregator must outlive the object.
   EarlierEvaluations(SearchSpace space, const ObjectiveAggregator& aggregator, std::map<int, Record> records);
 
-  /// Takes out the result of the evaluation with that number, its aggregate as it is to be at this point of the run;
-  /// nothing where the earlier run did not come to it. `set` is on the search scale. Throws FatalError when the earlier
-  /// run has evaluated another set under that number.
+  /// Removes and returns the result of the evaluation with this number, with the aggregate that it has at this point of
+  /// the run; empty if the earlier run did not make it. `set` is on the search scale. Throws FatalError if the earlier
+  /// run evaluated another set under this number.
   std::optional<EvaluationResult> take(int number, std::span<const double> set);
 
  private:

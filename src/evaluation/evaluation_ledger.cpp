@@ -23,7 +23,7 @@ void EvaluationLedger::replay(std::size_t place, EvaluationResult result) {
   store(place, std::move(result));
 }
 
-/// Counts a result that was reported.
+/// Stores and counts a result that has been reported.
 void EvaluationLedger::store(std::size_t place, EvaluationResult result) {
   if (!result.ok()) failedRuns_.countFailure(result.number, *result.failure);
   results_[place] = std::move(result);
@@ -55,7 +55,7 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
     outcome = result.failure->kind == EvaluationFailure::Kind::constraintsViolated ? progress::kConstraintsViolated
                                                                                    : progress::kModelRunError;
   }
-  std::optional<EvaluationResult> known;  // a repeated run has its row already, which stands
+  std::optional<EvaluationResult> known;  // a repeated run has its row already, which is kept
   if (earlier_ != nullptr) known = earlier_->take(result.number, sets_[place]);
   if (!known) observer_.recordEvaluation(sets_[place], result);
   observer_.message(progress::completedMessage(result.number, outcome));
@@ -64,7 +64,7 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
     return replay(place, std::move(*known));
   }
   observer_.evaluationFinished(sets_[place], result);
-  result.shownSeries = {};  // a batch keeps its results to its end
+  result.shownSeries = {};  // not needed any more; the batch keeps its results until it is complete
   store(place, std::move(result));
 }
 

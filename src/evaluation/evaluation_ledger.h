@@ -18,37 +18,37 @@
 namespace mirevo {
 
 /// The bookkeeping of an evaluation loop, whoever runs the model: which set comes next, its number in the run, what is
-/// said and recorded about it, what counts as failed, and the results in the order of the sets.
+/// reported and recorded about it, what counts as failed, and the results in the order of the sets.
 class EvaluationLedger final {
  public:
-  /// `earlier`: evaluations that are not to be made again; may be null.
+  /// `earlier`: evaluations that are not repeated; may be null.
   EvaluationLedger(EvaluationObserver& observer, FailedRunPolicy& failedRuns, EarlierEvaluations* earlier = nullptr)
       : observer_(observer), failedRuns_(failedRuns), earlier_(earlier) {}
 
-  /// Opens the next batch of the run; its sets are known by their 0-based place in it. `sets` must outlive the batch.
-  /// Sets that an earlier run has evaluated get their results at once, unless their model runs are wanted. Throws
-  /// FatalError past the failed-run limit, and for an earlier evaluation of another set.
+  /// Opens the next batch of the run; `place` below is the 0-based index of a set in it. `sets` must outlive the batch.
+  /// Sets that an earlier run has evaluated get their results at once, unless `mode` requires their model runs. Throws
+  /// FatalError when the failed-run limit is exceeded, and if an earlier evaluation was of another set.
   void begin(std::span<const ParameterSet> sets, DispatchMode mode);
-  /// The next set in their order that has no result yet, nothing when all are taken.
+  /// The next set, in order, that has no result yet; empty when all are taken.
   std::optional<std::size_t> takeNext();
   const ParameterSet& set(std::size_t place) const { return sets_[place]; }
   /// The set's number in the run, from 1.
   int numberOf(std::size_t place) const { return evaluationCount_ + static_cast<int>(place) + 1; }
-  /// The set's model run has started.
+  /// To be called when the model run of the set has started.
   void markInitiated(std::size_t place);
-  /// The set has its result, whose number is filled in here. `leftBehind`: what the launcher says of processes that
-  /// had to be ended, or empty. Throws FatalError past the failed-run limit.
+  /// Takes the result of a set; its number is filled in here. `leftBehind`: what the launcher says of processes that
+  /// had to be ended, or empty. Throws FatalError when the failed-run limit is exceeded.
   void finish(std::size_t place, EvaluationResult result, std::string_view leftBehind = {});
-  /// Whether the process folder of this result's run is to be kept; to be asked before it is finished.
+  /// Whether the process folder of this model run is to be kept; to be asked before finish().
   bool isFolderWanted(const EvaluationResult& result) const {
     return !result.ok() && failedRuns_.isFolderWanted(*result.failure);
   }
   bool isComplete() const { return finishedCount_ == sets_.size(); }
-  /// Closes a complete batch: one result a set, in their order.
+  /// Closes a complete batch and returns one result per set, in order.
   std::vector<EvaluationResult> end();
 
  private:
-  /// A warning for each measure that a run judged by fewer observations than any run before it.
+  /// Warns of each measure for which this run has values for fewer observations than any run before.
   void warnOfUnusedObservations(const EvaluationResult& result);
   void replay(std::size_t place, EvaluationResult result);
   void store(std::size_t place, EvaluationResult result);
@@ -62,10 +62,11 @@ class EvaluationLedger final {
   std::size_t next_ = 0;                           ///< first set that was not taken
   std::size_t finishedCount_ = 0;                  ///< sets that have a result
   int evaluationCount_ = 0;                        ///< sets of the batches before this one
-  std::map<std::size_t, std::size_t> fewestUsed_;  ///< observations that a warning was given for, by measure
+  std::map<std::size_t, std::size_t> fewestUsed_;  ///< by measure, the fewest observations used of which a warning was
+                                                   ///< given
 };
 
-/// Evaluator::settleAggregates() of the evaluators that run models; the scales found are reported as messages.
+/// Evaluator::settleAggregates() of the evaluators that run models; reports the scales found as messages.
 void settleAggregates(ObjectiveAggregator& aggregator, std::span<EvaluationResult> sample,
                       EvaluationObserver& observer);
 

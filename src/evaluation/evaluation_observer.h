@@ -8,7 +8,7 @@
 
 namespace mirevo {
 
-/// Learns what the evaluation loops do; reports it, records it, and knows whether the run was cancelled.
+/// Is told what the evaluation loops do, reports and records it, and knows whether the run was cancelled.
 class EvaluationObserver {
  public:
   EvaluationObserver() = default;
@@ -20,19 +20,19 @@ class EvaluationObserver {
   virtual void message(std::string_view text) = 0;
   /// A warning for the log alone.
   virtual void warning(std::string_view text) = 0;
-  /// Puts a finished evaluation on disk. Comes before anything tells of its end, so that nothing is reported as done
-  /// that a full disk or a kill could still take away.
+  /// Writes a finished evaluation to disk. Called before anything reports its end, so that nothing is reported as done
+  /// that a full disk or a kill could still destroy.
   virtual void recordEvaluation(std::span<const double> set, const EvaluationResult& result) {
     static_cast<void>(set);
     static_cast<void>(result);
   }
   /// An evaluation has finished, in order of arrival; `set` is on the search scale. Called before its result is used.
   virtual void evaluationFinished(std::span<const double> set, const EvaluationResult& result) = 0;
-  /// An evaluation has its result from an earlier run and not from the model. It counts like any other.
+  /// An evaluation has its result from an earlier run instead of the model. It counts like any other.
   virtual void evaluationReplayed(std::span<const double> set, const EvaluationResult& result) {
     evaluationFinished(set, result);
   }
-  /// Whether an outside party wants the run to stop. Once true it stays true.
+  /// Whether the run was cancelled from outside. Once true it stays true.
   virtual bool isCancelled() = 0;
 };
 

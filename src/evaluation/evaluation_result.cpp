@@ -11,7 +11,7 @@ struct KindNames {
   std::string_view name;
 };
 
-/// In the order of the kinds. Files hold the keys, which never change; the names are for people.
+/// In the order of the kinds. The keys are used in files and never change; the names are for people.
 constexpr std::array<KindNames, 10> kKinds = {{
     {"constraintsViolated", "parameter constraints violated"},
     {"equationNotFinite", "equation without a finite value"},

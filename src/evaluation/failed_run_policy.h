@@ -7,15 +7,15 @@ namespace mirevo {
 /// Counts the failed evaluations of a run against their limit, a tenth (rounded down) of the evaluations planned.
 class FailedRunPolicy final {
  public:
-  /// `foldersToKeep`: of so many failed model runs, the first ones, the process folder is to be kept.
+  /// `foldersToKeep`: the number of failed model runs, counted from the first, whose process folder is kept.
   explicit FailedRunPolicy(int plannedEvaluations, int foldersToKeep = 0)
       : planned_(plannedEvaluations), limit_(plannedEvaluations / 10), foldersLeft_(foldersToKeep) {}
 
-  /// Counts one failure, of the evaluation with that number. Throws FatalError with "Error: Unable to continue. No of
+  /// Counts the failure of the evaluation with this number. Throws FatalError with "Error: Unable to continue. No of
   /// failed simulations too high." when the count exceeds the limit; the detail holds the evidence of this failure.
   void countFailure(int number, const EvaluationFailure& failure);
 
-  /// Whether the folder of a failed run that is about to be counted is one to keep.
+  /// Whether to keep the folder of a failed run that is about to be counted.
   bool isFolderWanted(const EvaluationFailure& failure) const { return foldersLeft_ > 0 && failure.isOfModelRun(); }
 
   int failedCount() const { return failedCount_; }

@@ -11,14 +11,14 @@
 
 namespace mirevo {
 
-/// Longest time between two looks at the running batches and at the cancellation; a batch that ends ends the wait.
-/// Short enough for a cancelled run to be over within 3 seconds, the grace time of models that ignore SIGTERM included.
+/// Longest time between two checks of the running batches and of the kill file; the end of a batch ends the wait. Short
+/// enough for a cancelled run to end within 3 seconds, including the grace time of models that ignore SIGTERM.
 inline constexpr double kPollSeconds = 0.5;
 
 /// Runs the model in local slots, several at once.
 class LocalEvaluator final : public Evaluator {
  public:
-  /// `earlier`: evaluations that are not to be made again; may be null. All must outlive this.
+  /// `earlier`: evaluations that are not repeated; may be null. All must outlive the object.
   LocalEvaluator(ModelRunner& runner, EvaluationObserver& observer, FailedRunPolicy& failedRuns, int slotCount,
                  EarlierEvaluations* earlier = nullptr);
 
@@ -26,16 +26,16 @@ class LocalEvaluator final : public Evaluator {
   void settleAggregates(std::span<EvaluationResult> sample) override;
 
  private:
-  /// Starts the next set on the free slot; sets that cannot be run get their result at once and the one after is taken.
+  /// Starts the next set on the free slot; sets that cannot be run get their result at once and are skipped.
   void startNext(int slot);
-  /// Takes the results of slots whose batch has ended and starts the next set there; false when none has ended.
+  /// Takes the results of slots whose batch has ended and starts the next sets there; false when none has ended.
   bool takeFinished();
   void stopIfCancelled();
 
   ModelRunner& runner_;
   EvaluationObserver& observer_;
   EvaluationLedger ledger_;
-  std::vector<std::optional<std::size_t>> slots_;  ///< the set that runs in each slot, by its place in the batch
+  std::vector<std::optional<std::size_t>> slots_;  ///< index in the batch of the set that runs in each slot
 };
 
 }  // namespace mirevo

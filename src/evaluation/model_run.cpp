@@ -25,7 +25,7 @@ namespace {
 
 using Kind = EvaluationFailure::Kind;
 
-/// How many of the last lines that a failed batch printed are kept as evidence.
+/// Number of last lines of a failed batch's output that are kept as evidence.
 constexpr int kEvidenceLines = 20;
 constexpr std::string_view kCrossSectionExtension = ".qcsr";
 
@@ -103,7 +103,7 @@ ModelRunner::ModelRunner(ModelDescription description, ParameterModel& parameter
       const ParameterFileItem& item = description_.parameterFiles[i];
       files.parameterFiles.push_back(slotPath(item.paramFileName, slot));
       if (converted[i].empty()) continue;
-      // The base folder is never written, so the converted template lies in the copies; it is there to be looked at.
+      // For inspection only; in the copies, since the base folder is never written to.
       const std::string name = slotPath(item.templateFileName, slot) + description_.fileTag + ".tpl";
       std::string reason;
       if (!writeByUnlinkAndCreate(name, converted[i], 0666, reason))
@@ -166,7 +166,7 @@ std::optional<EvaluationFailure> ModelRunner::prepareModelRun(std::span<const do
   if (const auto* failure = std::get_if<ParameterFailure>(&mapped)) return parameterFailure(*failure);
   const auto modelValues = std::get<std::span<const double>>(mapped);
   const SlotFiles& files = slots_.at(static_cast<std::size_t>(slot - 1));
-  // What a run did not write must never be taken for its result.
+  // Files of an earlier run must never be taken for results of this one.
   for (const std::string& path : files.simulationFiles) removeFile(path);
   if (!files.measureFile.empty()) removeFile(files.measureFile);
   savedFiles_.markAsOld(launcher_.getProcessFolder(slot));
@@ -251,7 +251,7 @@ void ModelRunner::keepFailedFolder(int slot, int number, std::vector<std::string
   std::string reason;
   try {
     makeProcessFolder(folder, kept, processFolderPrefix_);
-    const std::string log = std::string("/") + kBatchLogName;  // no part of the model, so not copied with it
+    const std::string log = std::string("/") + kBatchLogName;  // not part of the model, so not copied with it
     struct stat status {};
     const bool hasLog = ::stat((folder + log).c_str(), &status) == 0 || errno != ENOENT;
     if (!hasLog || copyWhole(folder + log, kept + log, reason)) return;
@@ -341,7 +341,7 @@ std::optional<EvaluationFailure> ModelRunner::readSeriesMeasure(int slot, std::s
                        slot);
   }
   try {
-    // A model that stopped early must not end the run; a setup whose period no run could ever meet does.
+    // A model that stopped early is a failed evaluation; a setup whose period no model run can match ends the run.
     if (series_.hadPairs(i) && !hasPairs(measure, description_.period, simulation, series_.observation(i))) {
       return makeFailure(Kind::resultsNotWritten,
                          fmt::format("{}: item No. {} ({}) has no value at any observation time in the evaluation "
@@ -353,7 +353,7 @@ std::optional<EvaluationFailure> ModelRunner::readSeriesMeasure(int slot, std::s
         computeMeasureStatistics(measure, description_.period, simulation, series_.observation(i));
     result.measureValues[i] = selectStatistic(statistics, measure.statisticType);
     noteUnusedObservations(i, statistics, result);
-  } catch (const FatalError& error) {  // it names the file as the setup does
+  } catch (const FatalError& error) {  // the message names the file as in the setup
     fatalError(error.message(), error.detail() + "\nread from " + path);
   }
   return std::nullopt;

@@ -19,48 +19,47 @@
 
 namespace mirevo {
 
-/// Everything that turns a parameter set into a result, apart from the parameters themselves. File names are absolute.
+/// All that is needed to turn a parameter set into a result, except the parameters themselves. File names are absolute.
 struct ModelDescription {
   std::string baseFolder;
-  std::string fileTag;  ///< marks the files that a run makes, so that runs do not meet
+  std::string fileTag;  ///< name of the setup; part of the names of converted templates in process folders
   std::vector<ParameterFileItem> parameterFiles;
   std::vector<OutputMeasure> measures;
   std::string measureFile;  ///< output-measure file; empty when no measure is of interface type 1
   EvaluationPeriod period;
   std::vector<ObjectiveFunction> objectives;
-  std::vector<std::string> savedFiles;  ///< kept of every model run
+  std::vector<std::string> savedFiles;  ///< files kept from every model run
   std::string savedFolder;              ///< where they are kept
-  std::string failedFolderPrefix;       ///< a failed run's folder is kept as this text and the evaluation's number
+  std::string failedFolderPrefix;       ///< path of a failed run's folder, without the evaluation number that follows
   bool keepSimulatedValues = false;     ///< results hold the simulated values at the observation times
 };
 
-/// Model runs in slots: writes the input, starts the batch, and turns what it wrote into a result. Used by the local
-/// loop and by an MPI worker (which has slot 1 alone).
+/// Model runs in slots: writes the input, starts the batch, and turns its output into a result. Used by the local loop
+/// and by an MPI worker (which has slot 1 only).
 class ModelRunner final {
  public:
-  /// Reads and checks the templates and opens the observed series (all before any folder is made), then has the
+  /// Reads and checks the templates and opens the observed series (all before any folder is made), then lets the
   /// launcher make the slots' folders; with a slot count of 0 (the MPI master, which runs no model) the launcher is not
-  /// asked for anything. Throws FatalError.
+  /// used. Throws FatalError.
   ModelRunner(ModelDescription description, ParameterModel& parameters, ObjectiveAggregator& aggregator,
               ProcessLauncher& launcher, const LauncherSettings& launcherSettings);
 
-  /// Why the set cannot be run, if that is so.
+  /// Why the set cannot be run; empty if it can.
   std::optional<EvaluationFailure> findUnrunnable(std::span<const double> set);
 
   /// Builds the full parameter vector, removes the results of the slot's last run, writes the parameter files and
-  /// starts the batch; or says why the set is not run. Throws FatalError when a file cannot be removed or written.
+  /// starts the batch; or returns why the set is not run. Throws FatalError when a file cannot be removed or written.
   std::optional<EvaluationFailure> prepareModelRun(std::span<const double> set, int slot);
 
-  /// After the slot's batch has ended: its result, with number 0. What a model run may do wrong makes a failed result;
-  /// throws FatalError for what the measures cannot be computed from at all.
+  /// The result of the slot's batch, which must have ended; its number is 0. Faults of the model run give a failed
+  /// result. Throws FatalError if the setup or the observations are at fault.
   EvaluationResult collect(int slot);
 
-  /// Keeps the output files of the slot's run, whose evaluation has that number; `result` is given warnings for what
-  /// could not be kept. To be called before the slot's next run.
+  /// Keeps the output files of the slot's run, which belongs to evaluation `number`; adds warnings to `result` for
+  /// files that could not be kept. To be called before the slot's next run.
   void keepOutputFiles(int slot, int number, EvaluationResult& result) const;
 
-  /// Keeps a copy of the slot's folder, whose run has failed, for a person to look at; `warnings` is given a line when
-  /// that is not possible.
+  /// Keeps a copy of the slot's folder after a failed run; adds a line to `warnings` when that is not possible.
   void keepFailedFolder(int slot, int number, std::vector<std::string>& warnings) const;
 
   /// A result with the failed-run value in every field.
@@ -70,14 +69,14 @@ class ModelRunner final {
   ProcessLauncher& launcher() { return launcher_; }
   /// The observations of every measure of interface type 0; empty unless simulated values are kept.
   const std::vector<ObservedSeries>& observedSeries() const { return observedSeries_; }
-  /// The measures whose simulated series results may hold, 0-based: one a pair of series that is compared.
+  /// The measures whose simulated series a result may hold, 0-based: one per pair of series that is compared.
   const std::vector<std::size_t>& shownMeasures() const { return shownMeasures_; }
-  /// The observed series of each of them.
+  /// The observed series of each of shownMeasures().
   std::vector<PeriodSeries> readShownObservations();
   const std::vector<ParameterTemplate>& templates() const { return templates_; }
 
  private:
-  /// Where one slot's copies of the model's files lie.
+  /// Paths of one slot's copies of the model's files.
   struct SlotFiles {
     std::vector<std::string> parameterFiles;   ///< in the order of ModelDescription::parameterFiles
     std::vector<std::string> simulationFiles;  ///< in the order of SeriesTables::simulationFileNames()
@@ -85,14 +84,15 @@ class ModelRunner final {
   };
 
   void requireFilesInBaseFolder() const;
-  /// Returns the texts of converted numeric-ID templates, empty for the others: one a parameter file.
+  /// Returns one text per parameter file: that of a converted numeric-ID template, empty for the others.
   std::vector<std::string> readTemplates();
   std::string slotPath(const std::string& baseFile, int slot) const;
   void updateResistanceNumbers(const std::string& path);
   EvaluationResult judge(int slot);
   std::optional<EvaluationFailure> findBatchFailure(int slot) const;
   std::optional<EvaluationFailure> findMissingResults(int slot) const;
-  /// Fills in the measure and simulated values and leaves the series open, unless what the model wrote cannot be used.
+  /// Fills in the measures and simulated values and leaves the series open; returns a failure if the model's output
+  /// cannot be used.
   std::optional<EvaluationFailure> readMeasures(int slot, EvaluationResult& result);
   std::optional<EvaluationFailure> readSeriesMeasure(int slot, std::size_t measure, EvaluationResult& result);
   void noteUnusedObservations(std::size_t measure, const MeasureStatistics& statistics, EvaluationResult& result) const;
@@ -103,7 +103,7 @@ class ModelRunner final {
   ObjectiveAggregator& aggregator_;
   ProcessLauncher& launcher_;
   std::string processFolderPrefix_;
-  std::vector<ParameterTemplate> templates_;  ///< one a parameter file
+  std::vector<ParameterTemplate> templates_;  ///< one per parameter file
   SeriesTables series_;
   SavedFiles savedFiles_;
   std::vector<ObservedSeries> observedSeries_;

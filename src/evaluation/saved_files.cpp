@@ -17,8 +17,8 @@
 namespace mirevo {
 namespace {
 
-/// Time of last change that marks a file of before the run: one second after the epoch, which no model's file has. A
-/// comparison with the time at which the run began would depend on the clock and its grain.
+/// Modification time that marks a file as older than the run: one second after the epoch, which no model's file has. A
+/// comparison with the start time of the run would depend on the clock and its resolution.
 constexpr timespec kOldMark{1, 0};
 
 bool isMarked(const struct stat& status) {
@@ -34,8 +34,8 @@ SavedFiles::SavedFiles(const std::vector<std::string>& files, const std::string&
 
 void SavedFiles::markAsOld(const std::string& processFolder) const {
   const std::array<timespec, 2> times{timespec{0, UTIME_OMIT}, kOldMark};
-  // One that is not there needs no mark; one that cannot be marked is taken for the run's, as is one behind a link,
-  // which may lie outside the process folder.
+  // A missing file needs no mark. A file that cannot be marked counts as the run's, like one behind a link, which may
+  // be outside the process folder.
   for (const std::string& name : names_) {
     ::utimensat(AT_FDCWD, (processFolder + name).c_str(), times.data(), AT_SYMLINK_NOFOLLOW);
   }
@@ -44,7 +44,7 @@ void SavedFiles::markAsOld(const std::string& processFolder) const {
 std::vector<std::string> SavedFiles::save(const std::string& processFolder, int number) const {
   std::vector<std::string> problems;
   if (names_.empty()) return problems;
-  // What an interrupted run has kept of this evaluation is not this run's.
+  // Files that an interrupted run has kept from this evaluation are not of this model run.
   std::error_code failedToRemove;
   const std::string earlier = fmt::format("{}/{}", folder_, number);
   std::filesystem::remove_all(earlier, failedToRemove);

@@ -5,17 +5,17 @@
 
 namespace mirevo {
 
-/// The output files of the model that are kept of every run, each run's in a folder named by its evaluation number.
+/// The model's output files that are kept from every model run, each run's in a folder named by its evaluation number.
 class SavedFiles final {
  public:
   SavedFiles() = default;
-  /// `files` lie in or below `baseFolder`; all are absolute.
+  /// `files` are in or below `baseFolder`; all paths are absolute.
   SavedFiles(const std::vector<std::string>& files, const std::string& baseFolder, std::string folder);
 
-  /// Before a run: marks what lies in the process folder from before, so that save() can tell it from what the run
-  /// writes. The files stay, as the model may read them.
+  /// Before a run: marks the files that are in the process folder already, so that save() can tell them from those that
+  /// the run writes. They are not removed, as the model may read them.
   void markAsOld(const std::string& processFolder) const;
-  /// After a run: copies each file to folder/number, its path below the base folder kept. Returns one line for each
+  /// After a run: copies each file to folder/number, with its path below the base folder. Returns one line for each
   /// file that could not be kept, or that the run did not write.
   std::vector<std::string> save(const std::string& processFolder, int number) const;
 

@@ -5,8 +5,9 @@
 
 namespace mirevo {
 
-/// How well a simulated series fits an observed one, by the figures that hydrologists quote. NaN for what cannot be
-/// computed: all but the RMSE need observations that differ, the percent bias a sum of them that is not 0.
+/// Goodness-of-fit figures of a simulated against an observed series. NaN if a figure cannot be computed: without
+/// pairs; NSE and alpha if the observations do not vary; r if either series does not; beta and the percent bias if the
+/// observations sum to 0; the KGE if one of its components is NaN.
 struct FitFigures {
   std::size_t count = 0;     ///< pairs of a simulated and an observed value
   double nse = 0.0;          ///< Nash and Sutcliffe (1970), doi:10.1016/0022-1694(70)90255-6; 1 is perfect
@@ -16,7 +17,7 @@ struct FitFigures {
   double meanRatio = 0.0;    ///< beta: mean of the simulated over that of the observed values
   double percentBias = 0.0;  ///< 100 (sum of simulated - sum of observed) / sum of observed: positive is too much
   double rmse = 0.0;         ///< in the unit of the values
-  double rSquared = 0.0;     ///< the correlation's square
+  double rSquared = 0.0;     ///< square of the correlation
 };
 
 /// The figures of the pairs in which both values are finite; shape n each.

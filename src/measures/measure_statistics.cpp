@@ -16,7 +16,7 @@
 namespace mirevo {
 namespace {
 
-/// A measure's item in an opened file, with its axis.
+/// An item of an opened file, with its time axis.
 struct SeriesItem {
   const TimeSeriesObject& series;
   int item;
@@ -66,8 +66,8 @@ template <typename Use>
 void forEachObservation(const SeriesItem& simulation, const SeriesItem& observation, const EvaluationPeriod& period,
                         const Use& use) {
   const Period days = periodOn(simulation.start, period);
-  // Observation times on the simulation's axis: one offset of whole seconds, so equal civil times differ by rounding
-  // only, which is far below what counts as the same time.
+  // Observation times on the simulation's axis: one offset of whole seconds, so equal times differ by rounding only,
+  // which is far below the tolerance for the same time.
   const double offset = daysSince(simulation.start, observation.start);
   const std::span<const double> times = observation.series.times();
   const std::span<const float> observed = observation.series.values(observation.item);
@@ -81,7 +81,7 @@ void forEachObservation(const SeriesItem& simulation, const SeriesItem& observat
   }
 }
 
-/// The pairs in the period, and what is said of the observations without a simulated value.
+/// The pairs in the period, and the number and first time of the observations without a simulated value.
 MeasureStatistics collectPairs(const SeriesItem& simulation, const SeriesItem& observation,
                                const EvaluationPeriod& period) {
   MeasureStatistics statistics;
@@ -111,7 +111,8 @@ MeasureStatistics collectPairs(const SeriesItem& simulation, const SeriesItem& o
   return statistics;
 }
 
-/// Mean, rms and standard deviation over the pairs. Single precision, in observation order: deliberate.
+/// Mean, root mean square and standard deviation over the pairs. Deliberately in single precision and in observation
+/// order.
 void addDifferenceStatistics(float weight, float weightAbove, MeasureStatistics& statistics) {
   float sum = 0.0F;
   float sumOfSquares = 0.0F;
@@ -125,11 +126,11 @@ void addDifferenceStatistics(float weight, float weightAbove, MeasureStatistics&
   statistics.mean = sum / n;
   statistics.rootMeanSquare = std::sqrt(sumOfSquares / n);
   const float v = statistics.rootMeanSquare * statistics.rootMeanSquare - statistics.mean * statistics.mean;
-  // A v of zero, or slightly below it by rounding, is kept as it is: deliberately not clipped.
+  // If v is zero, or negative by rounding, the result is v itself: deliberately not clipped.
   statistics.standardDeviation = v > 0.0F ? std::sqrt(v) : v;
 }
 
-/// Peak and low difference over the period, cut to the simulated item's time span.
+/// Peak and low difference over the period, cut to the time span of the simulated series.
 void addPeakStatistics(const SeriesItem& simulation, const SeriesItem& observation, const EvaluationPeriod& period,
                        float weight, float weightAbove, MeasureStatistics& statistics) {
   const std::span<const double> times = simulation.series.times();

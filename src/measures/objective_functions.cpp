@@ -25,7 +25,7 @@ double normalDistribution(double z) {
   return 0.5 + 0.5 * std::erf(z * kOneBySquareRootOfTwo);
 }
 
-/// One objective function over the sample.
+/// Statistics of one objective function over the sample.
 struct SampleStatistics {
   double smallest = std::numeric_limits<double>::infinity();
   double largest = -std::numeric_limits<double>::infinity();
@@ -106,7 +106,7 @@ double aggregateObjective(std::span<const double> values, std::span<const double
       case AggregationMethod::none:
         aggregate += weights[i] * values[i];
         break;
-      // Here μ is added after the division and below it is subtracted before it: deliberately not alike.
+      // μ is added after the division here and subtracted before it below: deliberately different.
       case AggregationMethod::commonDistance:
         aggregate += weights[i] * (values[i] / sigma[i] + mu[i]);
         break;

@@ -17,13 +17,13 @@ enum class AggregationMethod : std::int32_t { none = 0, commonDistance = 1, comm
 inline constexpr CodeName kAggregationMethodNames[] = {
     {0, "none"}, {1, "common distance"}, {2, "common probability"}, {3, "zero"}};
 
-/// Combines output measures into one value and weighs it in the aggregate.
+/// Combines output measures into one value, which has a weight in the aggregate.
 struct ObjectiveFunction {
   std::string name;
   FunctionType functionType = FunctionType::sum;
   double weight = 1.0;
   std::vector<std::size_t> measures;        ///< 0-based indices into the run's output measures
-  std::optional<double> standardDeviation;  ///< σ of the transformation, where the setup gives it
+  std::optional<double> standardDeviation;  ///< σ of the transformation, if the setup gives it
   std::optional<double> location;           ///< μ, likewise
 };
 
@@ -34,27 +34,27 @@ std::string aggregationMethodName(AggregationMethod method);
 std::vector<double> objectiveFunctionValues(std::span<const ObjectiveFunction> functions,
                                             std::span<const double> measureValues);
 
-/// The aggregate over the objective functions: n values, weights, σ and μ each. n < 1 yields 0. Method 1 divides by σ
-/// and then adds μ, method 2 subtracts μ first: deliberate.
+/// The aggregate of n objective functions, with n values, weights, σ and μ; 0 for n < 1. Method 1 deliberately adds μ
+/// after the division by σ, method 2 subtracts it before.
 double aggregateObjective(std::span<const double> values, std::span<const double> weights,
                           std::span<const double> sigma, std::span<const double> mu, AggregationMethod method);
 
-/// The second stage with its transformation parameters, some of which are known only after the initial sample.
+/// Computes aggregates with the transformation parameters, some of which may be known only after the initial sample.
 class ObjectiveAggregator final {
  public:
   ObjectiveAggregator(std::span<const ObjectiveFunction> functions, AggregationMethod method);
 
   /// Whether every σ and μ that the method needs is known.
   bool isSettled() const;
-  /// The aggregate, NaN while it is not settled.
+  /// The aggregate; NaN unless isSettled().
   double aggregate(std::span<const double> objectiveValues) const;
-  /// Takes the missing σ and μ from the initial sample: one row of objective values an evaluation that succeeded, at
-  /// least two of them. σ is the sample's standard deviation (divisor n - 1); μ its mean on the probability scale, and
-  /// on the distance scale max over j of best_j/σ_j, less best_i/σ_i, so that every best value comes to lie at the same
-  /// distance from zero. Throws FatalError naming an objective function that is constant over the sample.
+  /// Determines the missing σ and μ from the initial sample: one row of objective values per successful evaluation, at
+  /// least two. σ is the standard deviation of the sample (divisor n - 1). μ is its mean on the probability scale, and
+  /// on the distance scale μ_i = max_j(best_j/σ_j) - best_i/σ_i, so that the best values of all objective functions are
+  /// at the same distance from zero. Throws FatalError naming an objective function that is constant over the sample.
   void fit(std::span<const std::vector<double>> sample);
 
-  /// The scale of each objective function as a line for people, once all are known; none where the method has no scale.
+  /// The scale of each objective function as a line for people, once all are known; empty if the method has no scale.
   std::vector<std::string> scaleLines() const;
 
   AggregationMethod method() const { return method_; }

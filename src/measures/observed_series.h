@@ -9,20 +9,20 @@
 
 namespace mirevo {
 
-/// The observations of one output measure: those in the evaluation period that are not missing. They stay the same for
-/// the whole run, so that simulated values at their times can be compared from one evaluation to the next.
+/// The observations of one output measure: those in the evaluation period that are not missing. They are the same for
+/// all evaluations of a run, so that simulated values at their times can be compared between evaluations.
 struct ObservedSeries {
   std::size_t measure = 0;     ///< 0-based index of the output measure
   DateRecord start{};          ///< origin of `days`
   std::vector<double> days;    ///< ascending
-  std::vector<double> values;  ///< one a time
+  std::vector<double> values;  ///< one per time
 };
 
-/// Both ends of the period belong to it. Throws FatalError where the item cannot be read.
+/// The period includes both ends. Throws FatalError if the item cannot be read.
 ObservedSeries readObservedSeries(std::size_t index, const OutputMeasure& measure, const EvaluationPeriod& period,
                                   TimeSeriesObject& observation);
 
-/// Appends the simulated value at each observation time, NaN where there is none.
+/// Appends the simulated value at each observation time to `values`, NaN where there is none.
 void appendSimulatedValues(const ObservedSeries& observed, const OutputMeasure& measure, TimeSeriesObject& simulation,
                            std::vector<double>& values);
 

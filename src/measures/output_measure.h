@@ -11,7 +11,8 @@ namespace mirevo {
 enum class InterfaceType : std::int32_t { timeSeries = 0, measureFile = 1 };
 inline constexpr CodeName kInterfaceTypeNames[] = {{0, "time series"}, {1, "measure file"}};
 
-/// A statistic by its place in their table (measures/statistics.h); the first ones have it as their code, too.
+/// A statistic by its index in the table of statistics (measures/statistics.h), which is also the code of those that
+/// have one.
 enum class StatisticType : std::int32_t {
   mean = 0,
   rootMeanSquare = 1,
@@ -26,15 +27,15 @@ struct SeriesReference {
   std::int32_t itemNo = 1;
 };
 
-/// One comparison of a simulated with an observed series, or a value that the model wrote, reduced to one number.
+/// A comparison of a simulated with an observed series, reduced to one number, or a number that the model wrote.
 struct OutputMeasure {
   std::string name;
   InterfaceType interfaceType = InterfaceType::timeSeries;
   std::int32_t measurementNo = 1;  ///< which number of the output-measure file, from 1
   StatisticType statisticType = StatisticType::mean;
-  double weight = 1.0;         ///< of simulations at or below the observation
-  double weightAbove = 1.0;    ///< of simulations above it
-  std::string functionName;    ///< the objective function it belongs to; empty: none
+  double weight = 1.0;         ///< of differences where the simulation is at or below the observation
+  double weightAbove = 1.0;    ///< of differences where it is above
+  std::string functionName;    ///< the objective function that it belongs to; empty: none
   SeriesReference simulation;  ///< in or below the base folder
   SeriesReference observation;
 };

@@ -30,7 +30,7 @@ PeriodSeries readPeriodSeries(TimeSeriesObject& series, const SeriesReference& r
   const std::optional<float> deleteValue = series.deleteValue();
   for (auto time = first; time != last; ++time) {
     const std::int64_t second = origin + std::llround(*time * kSecondsPerDay);
-    if (!read.seconds.empty() && second <= read.seconds.back()) continue;  // steps of less than a second
+    if (!read.seconds.empty() && second <= read.seconds.back()) continue;  // a step of less than a second
     const float value = values[static_cast<std::size_t>(time - times.begin())];
     read.seconds.push_back(second);
     read.values.push_back(isMissing(value, deleteValue) ? std::numeric_limits<float>::quiet_NaN() : value);

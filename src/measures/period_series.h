@@ -10,28 +10,28 @@
 
 namespace mirevo {
 
-/// One item of a time-series file over the evaluation period, on the file's own time steps: to be looked at, not to be
-/// judged by.
+/// One item of a time-series file over the evaluation period, at the time steps of the file: for display, not for the
+/// measures.
 struct PeriodSeries {
   std::vector<std::int64_t> seconds;  ///< secondNumber() of each step, ascending
-  std::vector<float> values;          ///< one a step, NaN for a missing one
+  std::vector<float> values;          ///< one per step, NaN for a missing one
 
   bool operator==(const PeriodSeries&) const = default;
 };
 
-/// The steps in the period, both ends included, and one on either side of it, from which a value at an end of the
-/// period is interpolated. Throws FatalError where the item cannot be read.
+/// The steps in the period, both ends included, and one step on either side, for interpolation at the ends of the
+/// period. Throws FatalError if the item cannot be read.
 PeriodSeries readPeriodSeries(TimeSeriesObject& series, const SeriesReference& reference,
                               const EvaluationPeriod& period);
 
-/// The values at those times (ascending): that of a step there, else linear between its two neighbours as the output
-/// measures have it, NaN outside the axis or beside a missing value.
+/// The values at the given times (ascending): that of a step at the time, else interpolated linearly between its two
+/// neighbours as for the output measures; NaN outside the time axis or next to a missing value.
 std::vector<float> valuesAt(const PeriodSeries& series, std::span<const std::int64_t> seconds);
 
 /// Whether two measures compare the same two series.
 bool isSamePair(const OutputMeasure& a, const OutputMeasure& b);
 
-/// The measures that compare series, 0-based: of those that compare the same pair the first.
+/// The measures that compare series, 0-based; of several that compare the same pair only the first.
 std::vector<std::size_t> measuresOfDistinctPairs(std::span<const OutputMeasure> measures);
 
 }  // namespace mirevo

@@ -13,8 +13,8 @@
 namespace mirevo {
 namespace {
 
-/// Index of the name in the table, which is given it when it is new. Names are equal when they are without their
-/// trailing blanks, case included.
+/// Index of the name in the table, to which a new name is added. Names are case-sensitive; trailing blanks do not
+/// count.
 std::size_t indexOf(std::vector<std::string>& table, std::string_view name) {
   const std::string_view trimmed = trimTrailing(name);
   const auto found = std::find(table.begin(), table.end(), trimmed);
@@ -23,11 +23,11 @@ std::size_t indexOf(std::vector<std::string>& table, std::string_view name) {
   return table.size() - 1;
 }
 
-/// Why the results of a model run in this file cannot be used; nothing when they can.
+/// Why the results of a model run in this file cannot be used; empty when they can.
 std::optional<std::string> findUnusable(TimeSeriesObject& series, const std::string& path, std::span<const int> items) {
   if (series.timeStepCount() < 1) return path + ": expected at least one time step, found none";
   for (const int item : items) {
-    if (item < 1 || item > series.itemCount()) continue;  // the measures end the run by it
+    if (item < 1 || item > series.itemCount()) continue;  // the measures then end the run
     if (!series.getData(item)) return series.lastError();
     const std::span<const float> values = series.values(item);
     const std::optional<float> deleteValue = series.deleteValue();
@@ -64,7 +64,7 @@ SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> mea
     tables.simulationItems_.resize(tables.simulationNames_.size());
     tables.simulationItems_[tables.simulationIndex_.back()].push_back(measure.simulation.itemNo);
   }
-  // In ascending order the columns of a text file are found one after another.
+  // In ascending order, so that the columns of a text file are found quickly one after another.
   for (std::vector<int>& items : tables.simulationItems_) {
     std::sort(items.begin(), items.end());
     items.erase(std::unique(items.begin(), items.end()), items.end());
@@ -81,7 +81,7 @@ void SeriesTables::checkItems(std::span<const OutputMeasure> measures, const Eva
   for (std::size_t i = 0; i < measures.size(); ++i) {
     if (observationIndex_[i] == kNoSeries) continue;
     requireItem(observation(i), measures[i].observation);
-    // Results of before the run that have no step yet say nothing of their columns either.
+    // Files in the base folder that have no time steps yet tell nothing about their columns.
     if (simulation(i).timeStepCount() < 1) continue;
     requireItem(simulation(i), measures[i].simulation);
     hadPairs_[i] = observation(i).timeStepCount() > 0 && hasPairs(measures[i], period, simulation(i), observation(i));

@@ -15,29 +15,29 @@ namespace mirevo {
 /// simulation file, open only while the measures of one evaluation are computed.
 class SeriesTables final {
  public:
-  /// Opens every observation file and, once as a check, every simulation file, and releases those again. Measures of
-  /// interface type 1 name no series. Item numbers that a file does not have and observations that cannot be read are
-  /// found here too, before a model has run. Throws FatalError with the fixed texts.
+  /// Opens every observation file and, as a check, every simulation file, which it releases again. Measures of
+  /// interface type 1 have no series. Item numbers that a file does not have and observations that cannot be read are
+  /// also found here, before the first model run. Throws FatalError with the fixed texts.
   static SeriesTables MirevoTSobjectInit(std::span<const OutputMeasure> measures, const EvaluationPeriod& period);
 
-  /// Opens the simulation files of one evaluation: `paths[i]` is where simulationFileNames()[i] lies in the slot's
+  /// Opens the simulation files of one evaluation: `paths[i]` is the copy of simulationFileNames()[i] in the slot's
   /// folder. Files still open are released first. Throws FatalError as openTimeSeries() does.
   void openSimulationFiles(std::span<const std::string> paths);
-  /// The same for results that a model run may have left unusable: one line for a person, with everything released
-  /// again, when a file cannot be opened or has no time step, or when a measured item cannot be read or has no value
-  /// that is not missing; nothing when the files stand open for the measures. An item number that a file does not have
-  /// is left to the measures, which end the run by it.
+  /// The same for results that a model run may have left unusable. Returns one line for a person, with all files
+  /// released, when a file cannot be opened or has no time step, or when an item in use cannot be read or has missing
+  /// values only; empty when the files are open. An item number that a file does not have is left to the measures,
+  /// which end the run.
   std::optional<std::string> tryOpenSimulationFiles(std::span<const std::string> paths);
   void releaseSimulationFiles();
 
   const std::vector<std::string>& observationFileNames() const { return observationNames_; }
   const std::vector<std::string>& simulationFileNames() const { return simulationNames_; }
 
-  /// The file of the measure with that 0-based index; the simulation one only between open and release.
+  /// The file of the measure with this 0-based index; simulation() may be called only between open and release.
   TimeSeriesObject& observation(std::size_t measure);
   TimeSeriesObject& simulation(std::size_t measure);
-  /// Whether the simulated series of before the run met any observation of that measure in the period: one that does
-  /// not during the run is then no fault of the setup.
+  /// Whether the simulated file in the base folder had a value for any observation of the measure in the period. If so,
+  /// a model run without one is not the fault of the setup.
   bool hadPairs(std::size_t measure) const { return hadPairs_.at(measure); }
 
  private:
@@ -47,10 +47,10 @@ class SeriesTables final {
 
   std::vector<std::string> observationNames_;
   std::vector<std::string> simulationNames_;
-  std::vector<std::size_t> observationIndex_;  ///< one a measure, 0-based
+  std::vector<std::size_t> observationIndex_;  ///< one per measure, 0-based
   std::vector<std::size_t> simulationIndex_;
-  std::vector<bool> hadPairs_;                     ///< one a measure
-  std::vector<std::vector<int>> simulationItems_;  ///< one a simulation file: the item numbers that measures name
+  std::vector<bool> hadPairs_;                     ///< one per measure
+  std::vector<std::vector<int>> simulationItems_;  ///< one per simulation file: the item numbers in use
   std::vector<std::unique_ptr<TimeSeriesObject>> observations_;
   std::vector<std::unique_ptr<TimeSeriesObject>> simulations_;
 };

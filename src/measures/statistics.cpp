@@ -11,7 +11,7 @@
 namespace mirevo {
 namespace {
 
-/// One of the figures that MeasureStatistics holds.
+/// One of the statistics that MeasureStatistics holds.
 template <float MeasureStatistics::*Figure>
 double figure(const MeasureStatistics& statistics) {
   return statistics.*Figure;
@@ -57,7 +57,7 @@ constexpr auto kNames = [] {
   return names;
 }();
 
-/// StatisticType is a place in the table, and its enumerators are codes.
+/// StatisticType is an index into the table, and its enumerators are the codes.
 constexpr bool codesArePlaces() {
   for (std::size_t i = 0; i < kTable.size(); ++i) {
     if (kTable[i].key.code && *kTable[i].key.code != static_cast<std::int32_t>(i)) return false;

@@ -11,21 +11,21 @@ namespace mirevo {
 
 struct MeasureStatistics;
 
-/// Which value of a statistic is best, on its own scale.
+/// Which value of a statistic is best, on the scale of the statistic.
 enum class Best { zero, smallest, largest };
 
 /// One way to reduce the comparison of two series to a number. A new one is a row of the table and a function of the
-/// pairs, computed in 64 bits.
+/// pairs, computed in double precision.
 struct Statistic {
-  CodeName key;                               ///< in setups; one without a code is chosen by its name alone
+  CodeName key;                               ///< in setups; one without a code has a name only
   std::string_view description;               ///< in the log and the report
   double (*value)(const MeasureStatistics&);  ///< on its own scale
   Best best;
-  /// What a value becomes in the measure's objective function, which a search minimises: 0 for a perfect fit, and
-  /// larger the worse it is. Those with a code go in as they are, a negative difference as such: its sign is left to
-  /// the function's type.
+  /// The contribution of a value to the objective function, which a search minimises: 0 for a perfect fit, larger for a
+  /// worse one. Values of statistics with a code are used unchanged, including negative differences: the type of the
+  /// objective function decides on the sign.
   double (*inObjective)(double value);
-  bool needsPeaks = false;  ///< of what MeasureStatistics holds it uses the peak and low difference
+  bool needsPeaks = false;  ///< it uses the peak or low difference of MeasureStatistics
 };
 
 /// Every statistic, those with a code first and in the order of their codes.
@@ -34,7 +34,7 @@ std::span<const Statistic> statisticTable();
 std::span<const CodeName> statisticNames();
 
 const Statistic& statisticOf(StatisticType type);
-/// The statistic of that name, in any letter case.
+/// The statistic with this name, in any letter case.
 std::optional<StatisticType> findStatistic(std::string_view name);
 
 }  // namespace mirevo

@@ -33,8 +33,8 @@ void refuseMutualDependencies(std::span<const ModelParameter> parameters, NamedP
   }
 }
 
-/// The parameters of a ring of dependencies, each naming the next and the last the first; empty when there is none.
-/// A depth-first search with its own stack, as the chain may be as long as the list.
+/// The parameters of a cycle of dependencies, each naming the next and the last the first; empty when there is none. A
+/// depth-first search with its own stack, as a chain may be as long as the list.
 std::vector<std::size_t> findRing(NamedParameters named) {
   enum class State : char { unseen, open, done };
   struct Visit {
@@ -102,8 +102,8 @@ std::vector<int> OrderDependentParameters(std::span<const ModelParameter> parame
       ++p;
       continue;
     }
-    // Swapping it past the latest parameter that it names, all those between move up by one place. What stands before p
-    // names nothing later and is not touched, so scanning on from p finds what scanning from the start would.
+    // Moves the parameter past the latest one that it names; those between move forward by one position. Those before p
+    // name no later one and are not moved, so the scan can continue from p.
     std::rotate(order.begin() + static_cast<std::ptrdiff_t>(p), order.begin() + static_cast<std::ptrdiff_t>(p) + 1,
                 order.begin() + static_cast<std::ptrdiff_t>(latest) + 1);
     for (std::size_t q = p; q <= latest; ++q) position[order[q]] = q;

@@ -8,13 +8,13 @@
 
 namespace mirevo {
 
-/// The order in which the parameters take their values: a permutation of 1..N in which every dependent parameter stands
+/// The order in which the parameters are evaluated: a permutation of 1..N in which every dependent parameter comes
 /// after those that its equation names. `named[i]` holds the 0-based indices of the parameters that occur in the
 /// equation of parameter i, ascending; it is empty for a parameter that is not dependent.
 ///
-/// From the setup order, a dependent parameter that names a later one is moved later, place by place, until it names
-/// none; then the scan begins again. Throws FatalError for parameters that depend on each other, on themselves, or in a
-/// ring, which is why the scan comes to an end.
+/// Starting from the setup order, a dependent parameter that names a later one is moved back, position by position,
+/// until it names none; then the scan starts again. Throws FatalError for a parameter that depends on itself and for
+/// cycles, without which the scan always ends.
 std::vector<int> OrderDependentParameters(std::span<const ModelParameter> parameters,
                                           std::span<const std::vector<std::size_t>> named);
 

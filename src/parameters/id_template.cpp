@@ -19,16 +19,16 @@ namespace {
 constexpr std::size_t kMinimumNameLength = 9;
 constexpr std::size_t kMostIdValuesShown = 10;
 
-/// What makes two ID values equal: their value in units of 1e-37, as the single-precision constants 1.0e37 and 0.1 give
-/// it in 64-bit arithmetic. Nothing for a value beyond 32 bits: it is no ID value and equals none.
+/// The key by which ID values are compared: the value in units of 1e-37, computed in 64 bits with the single-precision
+/// constants 1.0e37 and 0.1. Empty if it does not fit into 32 bits: such a value is not an ID value.
 std::optional<std::int32_t> idKey(double value) {
   const double scaled = value * static_cast<double>(1.0e37F) + static_cast<double>(0.1F);
   if (!(std::abs(scaled) < static_cast<double>(std::numeric_limits<std::int32_t>::max()))) return std::nullopt;
   return static_cast<std::int32_t>(scaled);
 }
 
-/// Position of the exponent letter of an ID value in `line`: of the first with a lower and the first with an upper case
-/// letter the later one; those of three digits go before those of two.
+/// Position of the exponent letter of an ID value in `line`: the later of the first one in lower and the first one in
+/// upper case; exponents of three digits are looked for before those of two.
 std::optional<std::size_t> findIdSuffix(std::string_view line, std::size_t& length) {
   for (const auto& [lower, upper] : {std::pair{"e-035", "E-035"}, std::pair{"e-35", "E-35"}}) {
     const auto lowerAt = line.find(lower);
@@ -55,7 +55,7 @@ std::optional<std::size_t> findIdSuffix(std::string_view line, std::size_t& leng
   fatalError(fmt::format("Error: Undefined parameter ID value {} found in template file", token), detail);
 }
 
-/// The first parameter with the ID value that the token reads as.
+/// The first parameter whose ID value the token is.
 const ModelParameter* findById(std::string_view token, std::span<const ModelParameter> parameters) {
   const std::optional<double> value = parseReal(token);
   const std::optional<std::int32_t> key = value ? idKey(*value) : std::nullopt;
@@ -68,13 +68,13 @@ const ModelParameter* findById(std::string_view token, std::span<const ModelPara
 std::string convertLine(std::string_view templateName, std::size_t lineNumber, std::string_view original,
                         std::span<const ModelParameter> parameters) {
   std::string line(original);
-  // The line with the placeholders made so far blotted out: a parameter name that looks like an ID value is not
-  // converted again, and the loop ends.
+  // The line with the placeholders made so far blanked out, so that a parameter name that looks like an ID value is not
+  // converted again and the loop ends.
   std::string searched = line;
   std::size_t length = 0;
   while (const std::optional<std::size_t> suffix = findIdSuffix(searched, length)) {
-    // 0-based position s: the character there stays. The walk ends at column 1 even when a token begins in it, which
-    // leaves the token's first character in front of the placeholder. Deliberate: templates rely on it.
+    // The character at the 0-based position s is kept. The loop ends at column 1 even if a token begins there, which
+    // leaves the first character of the token in front of the placeholder. Deliberate: templates rely on it.
     std::size_t s = *suffix;
     while (s > 0 && line[s] != ' ' && line[s] != '\t') --s;
     const std::size_t end = *suffix + length;

@@ -24,14 +24,14 @@ struct ModelParameter {
   double upperBound = 0.0;
   TransformationType transformationType = TransformationType::none;
   ParameterType parameterType = ParameterType::variable;
-  double idValue = 0.0;  ///< stands for the parameter in numeric-ID templates, such as 1.5E-035
+  double idValue = 0.0;  ///< denotes the parameter in numeric-ID templates, such as 1.5E-035
   std::string name;      ///< unique, at most 255 bytes, trailing blanks trimmed
-  std::string equation;  ///< of a dependent parameter
+  std::string equation;  ///< for a dependent parameter
   std::string comment;
   std::vector<std::string> keyLines;  ///< kept with the parameter, not interpreted
 };
 
-/// Compares two equations over the model parameters; a set that violates it is not run.
+/// Compares two equations over the model parameters; a parameter set that violates it is not run.
 struct InternalConstraint {
   std::string leftEquation;
   std::string rightEquation;

@@ -69,7 +69,7 @@ class ParameterModel::Implementation {
 
   const std::vector<std::string> names_;
   ExpressionEvaluator evaluator_;
-  std::vector<std::unique_ptr<CompiledExpression>> equations_;  ///< one a parameter, null unless dependent
+  std::vector<std::unique_ptr<CompiledExpression>> equations_;  ///< one per parameter, null unless dependent
   std::vector<CompiledConstraint> constraints_;
 };
 
@@ -160,7 +160,7 @@ std::optional<ParameterFailure> ParameterModel::Implementation::checkConstraints
     const double left = valueOf(*constraints_[c].left, constraint.leftEquation);
     const double right = valueOf(*constraints_[c].right, constraint.rightEquation);
     const std::string_view symbol = codeName(kLogicalOperatorNames, constraint.logicalOperator);
-    // A side that is not a number would satisfy every comparison; such a set is not run. Infinite sides are compared.
+    // A side that is NaN would satisfy every comparison; such a set is not run. Infinite sides are compared.
     const bool undefined = !symbol.empty() && (std::isnan(left) || std::isnan(right));
     if (!undefined && !CheckConstraint(left, right, constraint.logicalOperator)) continue;
     return ParameterFailure{

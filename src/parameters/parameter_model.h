@@ -25,7 +25,7 @@ class ParameterModel final {
  public:
   /// Builds the search space, compiles every equation once, refuses illegal relationships, orders the dependent
   /// parameters and compiles the constraints, in this order. Throws FatalError with the fixed texts; the detail names
-  /// the parameter or constraint. Of a dependent parameter neither initial value, bounds nor transformation are used.
+  /// the parameter or constraint. The initial value, bounds and transformation of a dependent parameter are not used.
   ParameterModel(std::vector<ModelParameter> parameters, std::vector<InternalConstraint> constraints);
   ~ParameterModel();
   ParameterModel(const ParameterModel&) = delete;
@@ -33,12 +33,12 @@ class ParameterModel final {
 
   const std::vector<ModelParameter>& parameters() const;
   const SearchSpace& searchSpace() const;
-  /// A permutation of 1..N: every dependent parameter stands after those that its equation names.
+  /// A permutation of 1..N: every dependent parameter comes after those that its equation names.
   const std::vector<int>& evaluationOrder() const;
 
   /// The full parameter vector of a model run (model scale, one value per parameter in setup order), or why the set
   /// cannot be run: an equation without a finite value, or a violated constraint. The vector stays valid until the next
-  /// call. `set` has one value a variable parameter, on the search scale.
+  /// call. `set` has one value per variable parameter, on the search scale.
   std::variant<std::span<const double>, ParameterFailure> MapToModelValues(std::span<const double> set);
 
  private:

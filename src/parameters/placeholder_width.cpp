@@ -15,7 +15,7 @@ namespace mirevo {
 namespace {
 
 constexpr int kSignificantDigits = 4;
-/// In a range that holds 0, values this much smaller than its larger bound matter no more.
+/// In a range that includes 0, values smaller than this fraction of the larger bound are negligible.
 constexpr double kNegligible = 1.0e-3;
 
 bool keepsDigits(double value, int width) {
@@ -26,7 +26,7 @@ bool keepsDigits(double value, int width) {
   return std::abs(*written - value) < unit;
 }
 
-/// Values with many digits, one or two a decade, of every magnitude in [lower, upper] and of both signs.
+/// Values with many digits, one or two per decade, of every magnitude in [lower, upper] and of both signs.
 void addMagnitudes(double lower, double upper, std::vector<double>& samples) {
   const double largest = std::max(std::abs(lower), std::abs(upper));
   const bool holdsZero = lower <= 0.0 && upper >= 0.0;

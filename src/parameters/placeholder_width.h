@@ -6,9 +6,9 @@
 
 namespace mirevo {
 
-/// What a placeholder of that width does to the values of a parameter, for a warning: "... keeps fewer than four
-/// significant digits of ...". Empty when every value tried (the initial value, the bounds and values of every
-/// magnitude between them) keeps four significant digits or all it has.
+/// The precision that a placeholder of this width costs the values of a parameter, for a warning: "... keeps fewer than
+/// four significant digits of ...". Empty when every value tried (the initial value, the bounds and values of every
+/// magnitude between them) keeps four significant digits, or all of its digits if it has fewer.
 std::string describePrecisionLoss(const ModelParameter& parameter, int width);
 
 }  // namespace mirevo

@@ -11,7 +11,7 @@
 namespace mirevo {
 namespace {
 
-/// Keeps a value that lies a rounding error below a step of an integer parameter on that step.
+/// Keeps a value that is a rounding error below a step of an integer parameter on that step.
 constexpr double kIntegerTolerance = 1.0e-8;
 
 void checkInitialValue(const ModelParameter& parameter) {

@@ -16,13 +16,13 @@ enum class TransformDirection : std::int32_t { forward = 0, backward = 1 };
 double TransformParameterValue(double value, double lowerBound, TransformationType type, TransformDirection direction,
                                bool& failed);
 
-/// The variable parameters on the search scale, in setup order; every vector has one entry a variable parameter.
+/// The variable parameters on the search scale, in setup order; every vector has one entry per variable parameter.
 struct SearchSpace {
   std::vector<std::string> names;
   std::vector<double> initial;
   std::vector<double> lower;
-  /// For an integer parameter one more than the transformed bound, on purpose: the searches draw continuous values in
-  /// [lower, upper + 1) and truncation then reaches every integer with equal width.
+  /// For an integer parameter deliberately one more than the transformed bound: the searches draw continuous values in
+  /// [lower, upper + 1), so that truncation gives every integer the same width.
   std::vector<double> upper;
   std::vector<TransformationType> transformation;
 
@@ -33,7 +33,7 @@ struct SearchSpace {
 /// transformation that fails, or no variable parameter at all.
 SearchSpace BuildSearchSpace(std::span<const ModelParameter> parameters);
 
-/// The values of a set on the model scale: shape and order of the set.
+/// The values of a set on the model scale, in the order of the set.
 std::vector<double> ToModelScale(const SearchSpace& space, std::span<const double> set);
 
 }  // namespace mirevo

@@ -24,7 +24,7 @@ bool isDigit(char c) {
   return c >= '0' && c <= '9';
 }
 
-/// The delimiter that the first line of a template holds.
+/// The delimiter in the first line of a template.
 char readDelimiter(std::string_view templateName, std::string_view line) {
   takeText(line, kByteOrderMark);
   line = trim(line);
@@ -42,7 +42,7 @@ char readDelimiter(std::string_view templateName, std::string_view line) {
   return delimiter;
 }
 
-/// The first parameter of that name, both without trailing blanks; or the count of parameters.
+/// Index of the first parameter with this name, without trailing blanks; the number of parameters if there is none.
 std::size_t findParameter(std::string_view name, std::span<const ModelParameter> parameters) {
   const auto found = std::find_if(parameters.begin(), parameters.end(), [name](const ModelParameter& parameter) {
     return trimBlanks(parameter.name) == name;
@@ -61,7 +61,7 @@ std::size_t findParameter(std::string_view name, std::span<const ModelParameter>
     for (const ModelParameter& parameter : parameters) names.emplace_back(trimTrailing(parameter.name));
     if (const auto nearest = nearestName(name, names)) detail += fmt::format("\ndid you mean \"{}\"?", *nearest);
   }
-  // The name stands twice: the text is fixed that way.
+  // The fixed text has the name twice.
   fatalError(fmt::format("Error: Parameter name {} in template file {} invalid", name, name), detail);
 }
 
@@ -106,7 +106,7 @@ std::string ParameterTemplate::fill(std::span<const double> modelValues) const {
   for (std::size_t i = 0; i < placeholders_.size(); ++i) {
     assert(placeholders_[i].parameter < modelValues.size());
     content += FormatValueForPlaceholder(modelValues[placeholders_[i].parameter], placeholders_[i].width);
-    // A wide placeholder at the end of a line keeps blanks behind its value; lines end without them.
+    // Removes the blanks after the value of a wide placeholder at the end of a line.
     if (pieces_[i + 1].starts_with('\n')) trimBlanksAtEnd(content);
     content += pieces_[i + 1];
   }

@@ -11,10 +11,10 @@
 
 namespace mirevo {
 
-inline constexpr char kConvertedDelimiter = '!';          ///< of a converted numeric-ID template
+inline constexpr char kConvertedDelimiter = '!';          ///< delimiter of a converted numeric-ID template
 inline constexpr std::size_t kMaximumLineLength = 50000;  ///< of a template line, in bytes
 
-/// How a template marks the places of values; any other number is a delimiter template, too.
+/// How a template marks values; any other number also means a delimiter template.
 enum class TemplateType : std::int32_t { delimiter = 0, numericId = 1 };
 inline constexpr CodeName kTemplateTypeNames[] = {{0, "delimiter"}, {1, "numeric ID"}};
 
@@ -25,20 +25,20 @@ struct ParameterFileItem {
   std::string templateFileName;
 };
 
-/// The delimiter template that a numeric-ID template stands for, as text with its delimiter line. `templateName` is
-/// used in messages. Throws FatalError for an ID value that no parameter has, for a token that is no number though it
-/// ends like an ID value, and for a line that is too long.
+/// Converts a numeric-ID template into a delimiter template, with its delimiter line. `templateName` is used in
+/// messages. Throws FatalError for an ID value that no parameter has, for a token that ends like an ID value but is not
+/// a number, and for a line that is too long.
 ///
 /// Deliberate: an ID value that begins in column 1 keeps its first character in front of the placeholder.
 std::string ConvertIdTemplate(std::string_view templateName, std::string_view text,
                               std::span<const ModelParameter> parameters);
 
-/// A delimiter template taken apart once, so that writing a parameter file costs one pass over its pieces.
+/// A delimiter template, split into pieces once, so that writing a parameter file takes one pass over them.
 class ParameterTemplate final {
  public:
   /// Throws FatalError for a text without a delimiter in its first line, for a placeholder that names no parameter, and
-  /// for a line that is too long. The first parameter of a name counts; trailing blanks of a name do not.
-  /// Messages count the lines of a template that was converted without the delimiter line put in front of it.
+  /// for a line that is too long. If several parameters have the same name, the first is taken; trailing blanks of a
+  /// name do not count. For a converted template line numbers in messages do not count the added delimiter line.
   ParameterTemplate(std::string_view templateName, std::string_view text, std::span<const ModelParameter> parameters,
                     bool isConverted = false);
 
@@ -48,9 +48,9 @@ class ParameterTemplate final {
   /// 0-based indices of the parameters that the template names, ascending, each once.
   std::vector<std::size_t> parametersNamed() const;
 
-  /// One warning a placeholder in which values between the parameter's bounds keep fewer than four significant digits,
-  /// with the width to use; and one a placeholder that a digit or a sign touches, as the model may read one number of
-  /// both.
+  /// One warning per placeholder in which values between the parameter's bounds keep fewer than four significant
+  /// digits, with the width to use, and one per placeholder next to a digit or sign, since the model may read both as
+  /// one number.
   std::vector<std::string> narrowPlaceholderWarnings(std::span<const ModelParameter> parameters) const;
 
  private:
@@ -66,8 +66,8 @@ class ParameterTemplate final {
   std::vector<Placeholder> placeholders_;
 };
 
-/// Writes a parameter file anew, keeping its mode; it must exist already. Throws FatalError with
-/// "Error: Unable to open " and the path, and the system's reason below.
+/// Rewrites an existing parameter file, keeping its mode. Throws FatalError with "Error: Unable to open " and the path,
+/// and the system's reason below.
 void WriteParameterFile(const std::string& path, const ParameterTemplate& parameterTemplate,
                         std::span<const double> modelValues);
 

@@ -8,10 +8,10 @@ namespace mirevo {
 /// The lines of a template, without line ends and trailing blanks. Throws FatalError for a line that is too long.
 std::vector<std::string_view> templateLines(std::string_view templateName, std::string_view text);
 
-/// Ends the run: line `lineNumber` (from 1) has `length` characters.
+/// Throws FatalError: line `lineNumber` (from 1) has `length` characters.
 [[noreturn]] void failLongLine(std::string_view templateName, std::size_t lineNumber, std::size_t length);
 
-/// `text` without trailing blanks; tabs stay, as the model may count columns by them.
+/// `text` without trailing blanks; tabs are kept, as the model may count columns by them.
 std::string_view trimBlanks(std::string_view text);
 
 }  // namespace mirevo

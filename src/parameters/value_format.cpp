@@ -13,7 +13,7 @@ namespace {
 /// Characters of the exponent part, such as E+05.
 constexpr std::size_t kExponentWidth = 4;
 
-/// In single precision on purpose: the limits between the two forms are 10^(w-1) - 1 as single precision gives it.
+/// Deliberately in single precision: the limits between the two forms are 10^(w-1) - 1, rounded to single precision.
 constexpr float kPowersOfTen[kMaximumValueWidth] = {1e0F,  1e1F,  1e2F,  1e3F,  1e4F,  1e5F,  1e6F,
                                                     1e7F,  1e8F,  1e9F,  1e10F, 1e11F, 1e12F, 1e13F,
                                                     1e14F, 1e15F, 1e16F, 1e17F, 1e18F, 1e19F};
@@ -24,7 +24,7 @@ void trimZeros(std::string& text) {
 }
 
 /// The value with as many decimals as 20 characters hold, always with its decimal point, without trailing zeros and
-/// without a trailing point; nothing when the digits before the point do not fit.
+/// without a trailing point; empty when the digits before the point do not fit.
 std::optional<std::string> fixedForm(double value, int width) {
   // Below 1e19 the digits before the point fit 64 bits; rounding may add one.
   const std::size_t digits = std::to_string(static_cast<std::uint64_t>(std::abs(value))).size();
@@ -41,7 +41,7 @@ std::optional<std::string> fixedForm(double value, int width) {
 }
 
 /// The mantissa with as many decimals as 20 characters hold, cut to what the width leaves beside the exponent part;
-/// nothing when the exponent needs three digits.
+/// empty when the exponent needs three digits.
 std::optional<std::string> exponentForm(double value, std::size_t width) {
   const int decimals = kMaximumValueWidth - static_cast<int>(kExponentWidth) - (value < 0 ? 3 : 2);
   std::string text = fmt::format("{:.{}E}", value, decimals);
@@ -66,8 +66,8 @@ std::string FormatValueForPlaceholder(double value, int width) {
   if (value == 0.0) {
     text = "0";
   } else if (std::isfinite(value)) {
-    // Beside the limits of the two forms: where the single-precision limit lies above the power of ten, or a sign takes
-    // a column, the fixed form would lose a digit before the point and be wrong by a factor of ten.
+    // Near the limits, where the single-precision limit is above the power of ten or a sign takes a column, the fixed
+    // form could lose a digit before the point and be wrong by a factor of ten; it is then empty.
     if (magnitude >= 1.0 && magnitude < upper) text = fixedForm(value, w);
     if (!text) text = exponentForm(value, static_cast<std::size_t>(w));
   }

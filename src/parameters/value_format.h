@@ -4,12 +4,12 @@
 
 namespace mirevo {
 
-/// Widest field that a value is written into; wider placeholders keep blanks behind it.
+/// Width of the widest field into which a value is written; the rest of a wider placeholder is blank.
 inline constexpr int kMaximumValueWidth = 20;
 
 /// The text of a value for a placeholder of `width` characters (delimiters included): right-aligned in its first
 /// min(width, 20) characters. Returns exactly `width` characters. Digits that do not fit are cut off, not rounded. A
-/// value whose exponent needs three digits, and one that is no number, becomes "*" followed by blanks.
+/// value whose exponent needs three digits, and one that is not a number, becomes "*" followed by blanks.
 std::string FormatValueForPlaceholder(double value, int width);
 
 }  // namespace mirevo

@@ -10,13 +10,13 @@ namespace mirevo {
 
 /// Failed evaluations of one kind.
 struct FailureReason {
-  std::string reason;  ///< of the first of them
+  std::string reason;  ///< that of the first evaluation
   int count = 0;
-  std::string example;  ///< the first of them: its number, and the last lines that its batch printed
+  std::string example;  ///< the number of the first evaluation and the last lines that its batch printed
 };
 
-/// Groups failed evaluations by their reasons, the most frequent first. Reasons that differ in numbers alone (a slot's
-/// folder, a value) are one.
+/// Groups failed evaluations by their reasons, the most frequent first. Reasons that differ only in numbers (a slot's
+/// folder, a value) count as one.
 std::vector<FailureReason> groupFailures(std::span<const FailureRow> failures);
 
 }  // namespace mirevo

@@ -9,19 +9,19 @@
 
 namespace mirevo {
 
-/// Writes one JSON value that may stand inside an HTML script element: in texts `<`, `>`, `&` and the line separators
-/// that JavaScript knows are escaped, and bytes that are no UTF-8 are replaced by U+FFFD. Numbers that are not finite
-/// become null. The caller opens and closes objects and arrays in pairs; commas come by themselves.
+/// Writes one JSON value that is safe inside an HTML script element: in texts `<`, `>`, `&` and the line separators of
+/// JavaScript are escaped, and bytes that are not UTF-8 are replaced by U+FFFD. Numbers that are not finite become
+/// null. The caller opens and closes objects and arrays in pairs; commas are added automatically.
 class JsonWriter final {
  public:
-  /// Figures for tables, and for what is only drawn.
+  /// Significant digits: for tables, and for values that are only drawn.
   enum class Digits { table = 10, drawn = 7 };
 
   JsonWriter& beginObject() { return open('{'); }
   JsonWriter& endObject() { return close('}'); }
   JsonWriter& beginArray() { return open('['); }
   JsonWriter& endArray() { return close(']'); }
-  /// A member's name; its value comes next.
+  /// The name of a member; its value must follow.
   JsonWriter& key(std::string_view name);
 
   JsonWriter& text(std::string_view value);
@@ -30,7 +30,6 @@ class JsonWriter final {
   JsonWriter& boolean(bool value);
   JsonWriter& null();
 
-  /// A member with a value.
   JsonWriter& member(std::string_view name, std::string_view value) { return key(name).text(value); }
   JsonWriter& member(std::string_view name, const char* value) { return key(name).text(value); }
   JsonWriter& member(std::string_view name, double value) { return key(name).number(value); }
@@ -40,7 +39,7 @@ class JsonWriter final {
     return key(name).integer(static_cast<std::int64_t>(value));
   }
   JsonWriter& member(std::string_view name, std::span<const std::string> values);
-  /// A text that is null where it is empty.
+  /// A text; null if it is empty.
   JsonWriter& optionalMember(std::string_view name, std::string_view value);
 
   template <class Number>

@@ -2,8 +2,10 @@
 
 #include <algorithm>
 #include <cmath>
+#include <filesystem>
 #include <limits>
 #include <map>
+#include <system_error>
 
 #include <fmt/core.h>
 
@@ -85,10 +87,12 @@ std::optional<ReportedBand> readBand(const std::string& path) {
   return band;
 }
 
-/// A table that an analysis has written; an empty one where there is none. Throws FatalError where there is one that
-/// cannot be read.
-ReadTable readTable(const std::string& filePrefix, const RunFile& file) {
-  return readDataTable(readFileIfThere(runFilePath(filePrefix, file)).value_or(""));
+/// A table that an analysis has written; an empty one, with the fault, where it cannot be read.
+ReadTable readTable(const std::string& path, std::string& fault) {
+  std::string reason;
+  const auto text = readTextFile(path, reason);
+  if (!text) fault = fmt::format("{}: {}", fileNameOf(path), reason);
+  return readDataTable(text.value_or(""));
 }
 
 /// The numbers in the cells from `first` on; NaN where there is none.
@@ -141,12 +145,22 @@ std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, 
   return reported;
 }
 
-std::optional<ReportedCovariance> reportedCovariance(const std::string& filePrefix) {
-  const ReadTable limits = readTable(filePrefix, run_files::kParameterLimits);
-  const ReadTable correlation = readTable(filePrefix, run_files::kCorrelation);
+std::optional<ReportedCovariance> reportedCovariance(const std::string& filePrefix, std::string& fault) {
+  const std::string limitsFile = runFilePath(filePrefix, run_files::kParameterLimits);
+  const std::string correlationFile = runFilePath(filePrefix, run_files::kCorrelation);
+  std::error_code ignored;
+  const bool hasNone =
+      !std::filesystem::exists(limitsFile, ignored) && !std::filesystem::exists(correlationFile, ignored);
+  if (hasNone) return std::nullopt;
+  const ReadTable limits = readTable(limitsFile, fault);
+  const ReadTable correlation = readTable(correlationFile, fault);
+  if (!fault.empty()) return std::nullopt;
   const auto leftOut = limits.column("LeftOut");
   constexpr std::size_t kNumbers = 4;  // behind the name
-  if (!leftOut || *leftOut <= kNumbers) return std::nullopt;
+  if (!leftOut || *leftOut <= kNumbers) {
+    fault = fileNameOf(limitsFile) + " is damaged";
+    return std::nullopt;
+  }
   ReportedCovariance found;
   for (const std::vector<std::string>& cells : limits.rows) {
     if (!cells[*leftOut].empty()) {
@@ -161,8 +175,13 @@ std::optional<ReportedCovariance> reportedCovariance(const std::string& filePref
     found.upper95.push_back(numbers[3]);
   }
   for (const std::vector<std::string>& cells : correlation.rows) found.correlation.push_back(numbersOf(cells, 1));
-  if (found.correlation.size() != found.names.size()) return std::nullopt;
-  return found;
+  const auto isRow = [&found](const std::vector<double>& row) { return row.size() == found.names.size(); };
+  if (found.correlation.size() == found.names.size() &&
+      std::all_of(found.correlation.begin(), found.correlation.end(), isRow)) {
+    return found;
+  }
+  fault = fmt::format("{} and {} do not fit together", fileNameOf(limitsFile), fileNameOf(correlationFile));
+  return std::nullopt;
 }
 
 }  // namespace mirevo

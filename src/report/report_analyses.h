@@ -14,20 +14,20 @@
 
 namespace mirevo {
 
-/// The names of all measures that compare the same pair of series as the one of that 0-based number, with commas.
+/// The names of all measures that compare the same pair of series as the one with this 0-based index, separated by
+/// commas.
 std::string pairName(std::span<const OutputMeasure> measures, std::size_t measure);
 
-/// The bands that a finished uncertainty analysis has written beside its results, one a pair of series; those that
+/// The bands that a finished uncertainty analysis has written beside its results, one per pair of series; those that
 /// cannot be read are left out.
 std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::string& filePrefix);
 
-/// What a local sensitivity analysis found, computed again from its rows; nothing while the run with the initial values
-/// is not there.
+/// The results of a local sensitivity analysis, computed from its rows; empty without a row for the initial values.
 std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, const SensitivitySettings& settings,
                                                        const SearchSpace& space, std::span<const ResultRow> rows);
 
-/// The covariance of the parameters that a finished sensitivity analysis has written beside its results; nothing where
-/// there is none.
-std::optional<ReportedCovariance> reportedCovariance(const std::string& filePrefix);
+/// The covariance of the parameters that a finished sensitivity analysis has written beside its results; empty if there
+/// is none, or if its files cannot be read, with the reason in `fault`.
+std::optional<ReportedCovariance> reportedCovariance(const std::string& filePrefix, std::string& fault);
 
 }  // namespace mirevo

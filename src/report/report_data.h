@@ -13,7 +13,7 @@
 
 namespace mirevo {
 
-/// What a report shows. Numbers that are unknown are NaN; texts may hold anything.
+/// What a report shows. Unknown numbers are NaN; texts may hold any characters.
 
 struct ReportedRun {
   std::string title;
@@ -28,7 +28,7 @@ struct ReportedRun {
   std::string message;  ///< why it stopped; may be empty
   int planned = 0;      ///< evaluations; 0: unknown
   std::string aggregation;
-  std::string algorithm;   ///< the name of a search: "DDS"; empty where there is none
+  std::string algorithm;   ///< the name of the search: "DDS"; empty: none
   std::string surrogate;   ///< empty: none
   int populationSize = 0;  ///< 0: none
   std::string periodStart;
@@ -71,12 +71,12 @@ struct ReportedEvaluations {
   std::vector<int> numbers;
   std::vector<bool> ok;
   std::vector<double> aggregate;
-  std::vector<std::vector<double>> parameters;  ///< one column a variable parameter, model scale
+  std::vector<std::vector<double>> parameters;  ///< one column per variable parameter, model scale
   std::vector<std::vector<double>> measures;
   std::vector<std::vector<double>> objectives;
 };
 
-/// The 5 to 95 % band of an uncertainty analysis, one entry an observation.
+/// The 5 to 95 % band of an uncertainty analysis, one entry per observation.
 struct ReportedBand {
   std::string measure;
   std::vector<std::int64_t> seconds;
@@ -85,7 +85,7 @@ struct ReportedBand {
   std::vector<float> median;
   std::vector<float> upper;
   std::size_t observationCount = 0;  ///< observations with a simulated value
-  std::size_t insideCount = 0;       ///< those of them in the band
+  std::size_t insideCount = 0;       ///< those inside the band
 };
 
 /// The parameter covariance of a sensitivity analysis on the model scale, one entry per parameter that has a variance.
@@ -116,11 +116,11 @@ struct ReportData {
   std::vector<ReportedMeasure> measures;
   std::vector<ReportedObjective> objectives;
   std::optional<ShownEvaluation> best;
-  std::optional<int> initialNumber;    ///< the evaluation that start values of measures are of
-  bool isOfInitialParameters = false;  ///< it has the setup's values; else it is the first that succeeded
+  std::optional<int> initialNumber;    ///< the evaluation that gives the initial values of the measures
+  bool isOfInitialParameters = false;  ///< it has the initial parameters; else it is the first that succeeded
   std::vector<FailureReason> failures;
   ReportedEvaluations evaluations;
-  std::int64_t periodFirst = 0;  ///< secondNumber() of the evaluation period's ends
+  std::int64_t periodFirst = 0;  ///< secondNumber() of the ends of the evaluation period
   std::int64_t periodLast = 0;
   SeriesTable series;
   std::vector<ReportedBand> bands;

@@ -7,7 +7,7 @@
 
 namespace mirevo {
 
-/// The page with its title and data in their places. `page` holds each of the two marks of reportPageTemplate() once.
+/// The page with title and data filled in. `page` holds each of the two marks of reportPageTemplate() once.
 std::string reportPage(std::string_view page, const ReportData& data);
 
 }  // namespace mirevo

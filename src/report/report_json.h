@@ -6,7 +6,7 @@
 
 namespace mirevo {
 
-/// The data as the report's page takes them: one JSON object that may stand inside an HTML script element.
+/// The data for the page of the report: one JSON object that is safe inside an HTML script element.
 std::string reportJson(const ReportData& data);
 
 }  // namespace mirevo

@@ -9,8 +9,8 @@
 
 namespace mirevo {
 
-/// All parameters of the setup with their start values and those of the best evaluation, which may be nullptr.
-/// `parameters`: the model of the same setup.
+/// All parameters of the setup with their start values and those of the best evaluation; `best` may be nullptr.
+/// `parameters` is the model of the same setup.
 std::vector<ReportedParameter> reportedParameters(const RunConfig& config, ParameterModel& parameters,
                                                   const ResultRow* best);
 

@@ -81,6 +81,9 @@ ReportData ReportBuilder::build() {
   data_.periodFirst = secondNumber(config_.period.start);
   data_.periodLast = secondNumber(config_.period.end);
   addRun();
+  if (!sources_.recordFault.empty()) {
+    note(fmt::format("How the run ended is taken from its results alone: {}.", sources_.recordFault));
+  }
   if (table.unusableLines > 0 && sources_.stage != RunStage::running) {
     const bool isOne = table.unusableLines == 1;
     note(fmt::format("{} of the result file {} cut off or damaged and left out.",
@@ -185,7 +188,7 @@ void ReportBuilder::addMeasures() {
 
 void ReportBuilder::addFailures() {
   if (std::count(data_.evaluations.ok.begin(), data_.evaluations.ok.end(), false) == 0) return;
-  const OptionalSource<std::vector<FailureRow>> source = readFailures(filePrefix_);
+  const OptionalSource<std::vector<FailureRow>> source = readFailures(filePrefix_, config_.task->facts().resultFiles);
   if (source.content) data_.failures = groupFailures(*source.content);
   if (!data_.failures.empty()) return;
   note(fmt::format("Why evaluations failed is not shown: {}: {}.", source.file,
@@ -228,7 +231,10 @@ void ReportBuilder::addAnalyses() {
   if (task.hasBands && isFinished) data_.bands = reportedBands(config_, filePrefix_);
   if (task.sensitivity == nullptr) return;
   data_.sensitivity = reportedSensitivity(config_, *task.sensitivity, space(), sources_.results.rows);
-  if (data_.sensitivity && isFinished) data_.sensitivity->covariance = reportedCovariance(filePrefix_);
+  if (!data_.sensitivity || !isFinished) return;
+  std::string fault;
+  data_.sensitivity->covariance = reportedCovariance(filePrefix_, fault);
+  if (!fault.empty()) note(fmt::format("The covariance is not shown: {}.", fault));
 }
 
 }  // namespace

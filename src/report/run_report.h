@@ -8,8 +8,8 @@
 
 namespace mirevo {
 
-/// What a report shows of a setup's run, from its files beside the setup (`filePrefix`: folder and name without
-/// ".kdx"). Nothing, with the reason, where there are no results.
+/// The content of the report on a setup's run, from its files beside the setup (`filePrefix`: folder and name without
+/// ".kdx"). Empty, with the reason, if there are no results.
 std::optional<ReportData> buildReport(const RunConfig& config, const std::string& filePrefix, std::string& reason);
 
 /// Builds the report and writes it to its path. False, with the reason, when that fails; never throws.

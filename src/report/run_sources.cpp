@@ -1,10 +1,13 @@
 #include "report/run_sources.h"
 
-#include <algorithm>
 #include <array>
 #include <ctime>
+#include <filesystem>
 #include <sys/stat.h>
+#include <system_error>
 #include <utility>
+
+#include <fmt/core.h>
 
 #include "common/files.h"
 #include "common/run_files.h"
@@ -31,6 +34,18 @@ OptionalSource<Content> readSource(const std::string& path, Read read) {
   return source;
 }
 
+std::optional<RunRecord> readRecord(const std::string& path, std::string& fault) {
+  const auto text = readTextFile(path, fault);
+  auto record = readRunRecord(text.value_or(""));
+  std::error_code ignored;
+  if (record || !std::filesystem::exists(path, ignored)) {
+    fault.clear();
+  } else {
+    fault = fmt::format("{}: {}", fileNameOf(path), text ? "it is damaged" : fault);
+  }
+  return record;
+}
+
 }  // namespace
 
 std::optional<RunSources> readRunSources(const RunConfig& config, const SearchSpace& space,
@@ -48,11 +63,8 @@ std::optional<RunSources> readRunSources(const RunConfig& config, const SearchSp
   }
   RunSources sources;
   sources.results = readResultTable(*text, resultColumns(config, space));
-  std::stable_sort(sources.results.rows.begin(), sources.results.rows.end(),
-                   [](const ResultRow& a, const ResultRow& b) { return a.number < b.number; });
-  auto record = readRunRecord(readFileIfThere(runFilePath(filePrefix, run_files::kRecord)).value_or(""));
-  // One record per setup: that of a run of another task says nothing about these results.
-  if (record && record->task != config.task->facts().name.name) record.reset();
+  putInOrder(sources.results.rows);
+  auto record = readRecord(runFilePath(filePrefix, names->record), sources.recordFault);
   const bool isGoingOn = RunLock::isHeld(config.setupFile);
   if (!record) {
     record = recordOfEarlierVersion(sources.results);
@@ -65,8 +77,8 @@ std::optional<RunSources> readRunSources(const RunConfig& config, const SearchSp
   return sources;
 }
 
-OptionalSource<std::vector<FailureRow>> readFailures(const std::string& filePrefix) {
-  return readSource<std::vector<FailureRow>>(runFilePath(filePrefix, run_files::kFailures), readFailureTable);
+OptionalSource<std::vector<FailureRow>> readFailures(const std::string& filePrefix, const ResultFileNames& names) {
+  return readSource<std::vector<FailureRow>>(runFilePath(filePrefix, names.failures), readFailureTable);
 }
 
 OptionalSource<SeriesTable> readSeries(const std::string& filePrefix) {

@@ -13,15 +13,16 @@
 
 namespace mirevo {
 
-/// What a run's files say of it.
+/// What is known of a run from its files.
 struct RunSources {
-  ResultTable results;  ///< rows in the order of their numbers
+  ResultTable results;  ///< rows in the order of their numbers, each number once
   RunRecord record;
+  std::string recordFault;  ///< why the record cannot be read; empty if it can, or if none was written
   RunStage stage = RunStage::running;
   std::string ended;  ///< empty while the run goes on
 };
 
-/// A file that need not be there.
+/// A file that may be absent.
 template <class Content>
 struct OptionalSource {
   std::optional<Content> content;
@@ -29,13 +30,12 @@ struct OptionalSource {
   std::string reason;  ///< why there is no content
 };
 
-/// Reads results and record of the setup's run; the run's lock says whether it is going on. `filePrefix`: folder and
-/// name of the setup. Nothing, with the reason, where there are no results. Throws FatalError where there is a record
-/// that cannot be read.
+/// Reads the results and the record of a setup's run; its lock tells whether it is still going on. `filePrefix`: folder
+/// and name of the setup. Empty, with the reason, if there are no results.
 std::optional<RunSources> readRunSources(const RunConfig& config, const SearchSpace& space,
                                          const std::string& filePrefix, std::string& reason);
 
-OptionalSource<std::vector<FailureRow>> readFailures(const std::string& filePrefix);
+OptionalSource<std::vector<FailureRow>> readFailures(const std::string& filePrefix, const ResultFileNames& names);
 OptionalSource<SeriesTable> readSeries(const std::string& filePrefix);
 
 }  // namespace mirevo

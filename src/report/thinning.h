@@ -8,18 +8,19 @@
 
 namespace mirevo {
 
-/// Longer series are thinned for drawing, so that a report stays a few megabytes: ten years of hourly values are not.
+/// Longer series are thinned for drawing, so that a report stays at a few megabytes; ten years of hourly values are
+/// shorter.
 inline constexpr std::size_t kMostDrawnTimes = 100'000;
 
-/// The times at which any of the columns has its smallest or largest value within a short span, at most
-/// kMostDrawnTimes of them: drawn, it looks as the whole does, peaks included.
+/// The series at the times at which one of its columns has its smallest or largest value within a short span, at most
+/// kMostDrawnTimes of them: drawn, it looks like the whole series, peaks included.
 ShownSeries thinned(const ShownSeries& series);
 
-/// Percentages of time, ascending between 0 and 100, for the curve of a thinned series.
+/// Exceedance percentages for the flow duration curve of a thinned series, ascending between 0 and 100.
 std::vector<double> exceedancePercentages();
 
-/// The value that is reached or exceeded during each of those percentages of the time; of the finite values, by their
-/// ranks. Empty without any.
+/// The values that are reached or exceeded during each of exceedancePercentages() of the time, from the ranks of the
+/// finite values. Empty if there are none.
 std::vector<double> flowDuration(std::span<const float> values);
 
 }  // namespace mirevo

@@ -7,8 +7,8 @@
 
 namespace mirevo {
 
-/// The arguments behind the program's name. Those that begin with "//" are switches of the front end; the others are
-/// counted.
+/// The arguments after the program's name. Those that begin with "//" are switches of the front end, the others are
+/// ordinary arguments.
 class CommandLine final {
  public:
   explicit CommandLine(std::vector<std::string> arguments) : arguments_(std::move(arguments)) {}
@@ -23,7 +23,7 @@ class CommandLine final {
   /// The last ordinary argument: the setup file; empty when there is none or it is blank.
   std::string_view setupFileName() const;
 
-  /// Whether "//qmon", in any case, asks for the progress viewer's front end.
+  /// Whether there is a "//qmon", in any letter case, which asks for the progress viewer.
   bool wantsProgressViewer() const;
 
  private:

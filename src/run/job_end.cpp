@@ -11,9 +11,9 @@
 namespace mirevo {
 namespace {
 
-/// For all workers to have ended their models, which may take a grace time and a kill.
+/// Time for all workers to end their models, including the grace time before a kill.
 constexpr double kWorkerStopSeconds = 20.0;
-/// At the end of a task, when a worker that was not needed may still be copying a large base folder.
+/// The same at the end of a task, when a worker that was not needed may still be copying a large base folder.
 constexpr double kWorkerPatienceSeconds = 600.0;
 
 }  // namespace
@@ -21,7 +21,7 @@ constexpr double kWorkerPatienceSeconds = 600.0;
 void leaveJob(RunState& state, int exitCode, std::string_view ending) {
   std::string reason = "a worker did not answer the request to stop";
   const auto warn = [&state, exitCode](const std::string& text) {
-    if (exitCode != 0) return;  // the run has failed already, with the first reason
+    if (exitCode != 0) return;  // the run has failed already; the first reason counts
     state.log.warning(text);
     showMessage("Warning: " + text, {}, MessageType::warning);
   };

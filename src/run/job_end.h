@@ -6,8 +6,8 @@
 
 namespace mirevo {
 
-/// The master's end of the run's job: stops the workers and leaves the job; ends the whole job where that is not
-/// possible, with `ending` as the last of the progress. A job of one process has nothing to end.
+/// Ends the job on the master: stops the workers and leaves the job. If that is not possible, writes `ending` as the
+/// end of the progress and aborts the job. Does nothing in a job of one process.
 void leaveJob(RunState& state, int exitCode, std::string_view ending);
 
 }  // namespace mirevo

@@ -33,7 +33,7 @@ Written beside the setup file: <setup>.log and the results of every evaluation. 
 messages here; creating the file <setup>._kill_ cancels the run.
 )";
 
-/// Whether the argument is a question about the program itself, and names no file.
+/// Whether the argument is a question about the program itself and not the name of a file.
 bool isQuestion(const std::string& argument) {
   std::error_code ignored;
   return (argument == "--version" || argument == "--help") && !std::filesystem::exists(argument, ignored);
@@ -47,8 +47,8 @@ void answerQuestion(const std::string& argument) {
   }
 }
 
-/// A run whose caller has closed standard input, output or error would open its files in their place, and messages
-/// would end up in the results.
+/// If the caller has closed standard input, output or error, opens them: otherwise the run's files would get these
+/// descriptors, and messages would end up in the results.
 void occupyStandardDescriptors() {
   int descriptor = 0;
   do {
@@ -65,7 +65,7 @@ void processStart(int argc, char** argv) {
   if (!commandLine.wantsProgressViewer()) runWithFrontEnd("G48=WIN", commandLine);
   const auto run = [&commandLine] { runWithFrontEnd("G48=QMON", commandLine); };
   const std::string setupFileName(commandLine.setupFileName());
-  // A job launcher watches over its processes, which must stay those that it started.
+  // A job launcher watches the processes that it started, so the run must stay in this one.
   const bool isPartOfJob = launcherRank() >= 0;
   if (setupFileName.empty() || isQuestion(setupFileName) || isPartOfJob) run();
   const auto prepare = [] {
@@ -85,9 +85,9 @@ void runWithFrontEnd(std::string_view environmentSetting, const CommandLine& com
 
 void mirevoMain(const CommandLine& commandLine) {
   const std::string setupFileName(commandLine.setupFileName());
-  const bool answers = launcherRank() <= 0;  // one process of a job
+  const bool answers = launcherRank() <= 0;  // only one process of a job
   if (setupFileName.empty()) {
-    if (!answers) stopRun(0);  // a launcher that sees this process fail ends the one that answers
+    if (!answers) stopRun(0);  // a launcher that sees this process fail would end the one that answers
     showMessage(kUsage);
     stopRun(1);
   }

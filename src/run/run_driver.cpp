@@ -35,7 +35,7 @@ namespace mirevo {
 namespace {
 
 using progress::kNormalTermination;
-constexpr double kPatienceSeconds = 3.0;  ///< for an earlier run of the setup that is just ending
+constexpr double kPatienceSeconds = 3.0;  ///< longest wait for an earlier run of the setup that is just ending
 
 std::string environmentValue(const char* name) {
   const char* value = std::getenv(name);
@@ -61,7 +61,7 @@ int RunDriver::run(const std::string& setupFileName) {
     buildModel();
     logSetup();
     openResults();
-    // Not before earlier results have been renamed: where they lie in the base folder, workers look at them.
+    // After earlier results have been renamed: if they are in the base folder, workers examine them.
     beginWorkers(*state_.job, {config_.setupFile, setupText});
     state_.progress.writeMessage(std::string(progress::kTitle) + config_.title);
     state_.progress.writeStatus(config_.taskDescription());
@@ -94,9 +94,9 @@ void RunDriver::openRun(const std::string& setupFileName) {
   std::error_code ignored;
   if (const std::string fault = faultOfFile(setup.file);
       !fault.empty() && std::filesystem::exists(setup.file, ignored)) {
-    fatalError("Error: Unable to open " + setup.file, fault);  // before files are made beside it: it may be in /dev
+    fatalError("Error: Unable to open " + setup.file, fault);  // before files are created beside it: it may be in /dev
   } else if (const std::string meant = setup.file + ".kdx"; !fault.empty() && faultOfFile(meant).empty()) {
-    // They would be those of that setup, of which a run may be going on.
+    // The run's files would be those of that setup, of which a run may be going on.
     fatalError("Error: Unable to open " + setup.file, fmt::format("{}; did you mean {}?", fault, meant));
   }
   if (!lock_.take(setup.file, kPatienceSeconds)) {
@@ -127,14 +127,14 @@ void RunDriver::openRun(const std::string& setupFileName) {
 void RunDriver::buildModel() {
   parameters_ = std::make_unique<ParameterModel>(config_.parameters, config_.constraints);
   aggregator_ = std::make_unique<ObjectiveAggregator>(config_.objectives, config_.aggregationMethod);
-  // Before the process folders are made anew: a run that cannot be taken up again leaves everything as it is.
+  // Before the process folders are made, so that a run that cannot be continued changes nothing.
   results_.emplace(config_, parameters_->searchSpace(), filePrefix_);
-  if (config_.task) config_.task->earlierSearches = results_->earlierSearches();
+  if (config_.task) config_.task->continueFrom(results_->earlierSearches());
   launcher_ = std::make_unique<PosixProcessLauncher>();
   signalState.haltProcesses = haltProcessesFromSignal;
   const int slotCount = state_.job->hasWorkers() ? 0 : config_.simultaneousSimulations;  // the master runs no model
   LauncherSettings settings = launcherSettings(config_, slotCount);
-  settings.isCancelled = [this] {  // copies of a large model take their time
+  settings.isCancelled = [this] {  // copying a large model takes time
     if (!state_.progress.isCancelled()) return false;
     state_.log.line("Simulation cancelled");
     state_.progress.writeMessage("Simulation cancelled");
@@ -179,8 +179,8 @@ void RunDriver::openResults() {
   }
 }
 
-/// Were the run killed, an earlier report would else pass for its own. One of the same run can be made anew at any
-/// time.
+/// If the run were killed, an earlier report would be taken for its own. A report of a continued run is removed, as it
+/// can be made again at any time.
 void RunDriver::putEarlierReportAside() {
   if (results_->earlierEvaluations() != nullptr) {
     std::error_code ignored;
@@ -243,7 +243,7 @@ std::vector<std::string> RunDriver::closingLines(const Ending& ending) const {
   return lines;
 }
 
-/// What is known of the run now that it has ended, for the record of it.
+/// Adds to the record what is known at the end of the run.
 void RunDriver::completeRecord(const Ending& ending) {
   RunRecord& record = results_->record().record();
   record.stage = ending.stage;
@@ -259,7 +259,7 @@ void RunDriver::completeRecord(const Ending& ending) {
     record.failuresByKind.emplace_back(failureKindKey(kind), count.count);
   }
   record.scales.clear();
-  if (aggregator_->scaleLines().empty()) return;  // there are none, or they are not known
+  if (aggregator_->scaleLines().empty()) return;  // there is no scale, or it is not known
   for (std::size_t i = 0; i < config_.objectives.size(); ++i) {
     record.scales.push_back({config_.objectives[i].name, aggregator_->sigma()[i], aggregator_->mu()[i]});
   }
@@ -319,7 +319,7 @@ void RunDriver::finish(const TaskOutcome& outcome) {
   endProgress(kNormalTermination);
 }
 
-/// Which reasons the run's failures had, and how often.
+/// Writes the reasons of the failures to the log, and how often each occurred.
 void RunDriver::logFailures() {
   if (reporter_->failedCount() == 0) return;
   state_.log.line("Why evaluations failed:");
@@ -338,8 +338,12 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
     state_.log.line(text);
     showMessage(text);
   }
-  closeResults({RunStage::failed, std::string(message), text});  // it has failed already, with the first reason
-  if (launcher_) launcher_->haltProcesses();                     // no model waits for the report
+  try {
+    closeResults({RunStage::failed, std::string(message), text});  // the first reason counts
+  } catch (const std::exception& error) {
+    state_.log.warning(std::string("The results may lack their end: ") + error.what());
+  }
+  if (launcher_) launcher_->haltProcesses();  // before the report, which takes time
   reportRun();
   return endEarly(message);
 }

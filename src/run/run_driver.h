@@ -23,8 +23,8 @@
 
 namespace mirevo {
 
-/// One run from its setup file to its exit code. It owns everything that the run is made of, so that all of it is still
-/// there when an error is reported, and goes away in the reverse order of its making.
+/// One run from its setup file to its exit code. It owns all parts of the run, so that they still exist when an error
+/// is reported and are destroyed in reverse order of construction.
 class RunDriver final {
  public:
   RunDriver();
@@ -32,7 +32,7 @@ class RunDriver final {
   RunDriver(const RunDriver&) = delete;
   RunDriver& operator=(const RunDriver&) = delete;
 
-  /// Runs the setup file; 0 after "Normal termination", else 1. The one place where an error ends a run.
+  /// Runs the setup file; returns 0 after "Normal termination", else 1. Errors that end a run are caught only here.
   int run(const std::string& setupFileName);
 
  private:
@@ -40,17 +40,16 @@ class RunDriver final {
   struct Ending {
     RunStage stage = RunStage::finished;
     std::string closingLine;  ///< of the result file
-    std::string message;      ///< with all that is known of the reason
+    std::string message;      ///< the message with its details
     std::string time = dateAndTimeNow();
   };
-  /// A file that could not be brought to its end.
+  /// A file that could not be completed.
   struct Unwritten {
     std::string path;
     std::string reason;
   };
 
-  /// Settles this process's part in the run's job. Throws FatalError when a job launcher started several processes that
-  /// cannot be brought together, as they would all write the same files.
+  /// Joins the job of the run. Throws FatalError like joinJob().
   void startJob();
   void openRun(const std::string& setupFileName);
   void buildModel();
@@ -58,26 +57,26 @@ class RunDriver final {
   void openResults();
   void putEarlierReportAside();
   void openSeries();
-  /// Runs the task, where there is one, and writes the files that it gives.
+  /// Runs the task, if there is one, and writes its files.
   TaskOutcome runTask();
-  /// Brings the results and the record of the run to their end; what failed, if anything did. `report`: what the task
-  /// found.
+  /// Completes the results and the record of the run; returns what failed, if anything. `report`: what the task found.
   std::optional<Unwritten> closeResults(const Ending& ending, std::span<const std::string> report = {});
   void completeRecord(const Ending& ending);
-  /// The report of what was done, where there is anything and the setup wants it. What goes wrong with it is a warning.
+  /// Writes the HTML report, if the setup asks for it and there are results. Failures are warnings.
   void reportRun();
   void finish(const TaskOutcome& outcome);
   void logFailures();
   int endInError(std::string_view message, std::string_view detail);
   int endCancelled(std::string_view message);
-  /// Log closed, model processes halted, job left, progress ended.
+  /// Closes the log, halts the model processes, leaves the job and ends the progress.
   int endEarly(std::string_view ending);
   void endProgress(std::string_view ending);
   std::vector<std::string> closingLines(const Ending& ending) const;
 
   RunState state_;
   RunLock lock_;
-  std::string filePrefix_;  ///< folder and name of the setup, without ".kdx": the run's files begin with it
+  std::string filePrefix_;  ///< folder and name of the setup, without ".kdx": the beginning of the paths of the run's
+                            ///< files
   RunConfig config_;
   std::unique_ptr<ParameterModel> parameters_;
   std::unique_ptr<ObjectiveAggregator> aggregator_;

@@ -6,10 +6,10 @@
 
 namespace mirevo {
 
-/// What turns a parameter set into a result, as the setup says.
+/// The description of the model in the setup.
 ModelDescription describeModel(const RunConfig& config);
 
-/// How the model is launched in `slotCount` slots, whose process folders are numbered from `firstFolderNumber` on.
+/// The launcher's settings for `slotCount` slots, whose process folders are numbered from `firstFolderNumber` on.
 LauncherSettings launcherSettings(const RunConfig& config, int slotCount, int firstFolderNumber = 1);
 
 }  // namespace mirevo

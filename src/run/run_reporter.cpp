@@ -27,14 +27,14 @@ void RunReporter::warning(std::string_view text) {
 
 void RunReporter::recordEvaluation(std::span<const double> set, const EvaluationResult& result) {
   const std::vector<double> values = ToModelScale(space_, set);
-  // The row comes last: where it stands, all that belongs to it does, too, whenever the program is ended.
+  // The row is written last: if it is on disk, all that belongs to it is, too, whenever the program ends.
   if (!result.ok()) failedRuns_.add(values, result);
   if (result.ok() && simulatedValues_ != nullptr) simulatedValues_->add(result);
   results_.addRow(resultRow(values, result));
 }
 
 void RunReporter::evaluationFinished(std::span<const double> set, const EvaluationResult& result) {
-  if (!result.ok()) state_.log.line("   " + result.failure->reason);  // below the message that it failed
+  if (!result.ok()) state_.log.line("   " + result.failure->reason);  // follows the message that it failed
   const std::vector<double> values = ToModelScale(space_, set);
   count(values, result, dateAndTimeWithZone());
   recordSeries(values, result);

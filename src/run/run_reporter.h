@@ -21,12 +21,12 @@ namespace mirevo {
 /// The reporting of a run: log, progress, result file and the file of failed runs.
 class RunReporter final : public EvaluationObserver {
  public:
-  /// The result file is open; all must outlive the reporter.
-  /// `simulatedValues`: takes those of every evaluation; may be null.
+  /// The result file must be open; all must outlive the reporter. `simulatedValues` receives those of every evaluation;
+  /// may be null.
   RunReporter(RunState& state, ResultFile& results, FailedRunFile& failedRuns, const SearchSpace& space,
               SimulatedValuesFile* simulatedValues = nullptr);
 
-  /// Has the series of the initial and the best evaluation recorded from here on; `recorder` must outlive the reporter.
+  /// From now on `recorder` records the series of the initial and the best evaluation; it must outlive the reporter.
   void recordSeries(SeriesRecorder& recorder) { recorder_ = &recorder; }
 
   void message(std::string_view text) override;
@@ -36,16 +36,16 @@ class RunReporter final : public EvaluationObserver {
   void evaluationReplayed(std::span<const double> set, const EvaluationResult& result) override;
   bool isCancelled() override { return state_.progress.isCancelled(); }
 
-  /// At the end of a run: fills in the aggregates of evaluations that came before the objective transformation was
-  /// settled, where it is now.
+  /// At the end of a run: fills in the aggregates of evaluations made before the transformation of the objective
+  /// functions was known, if it is known now.
   void settle(const ObjectiveAggregator& aggregator);
 
-  /// A search's own best is the run's best from here on: it knows which of equals it took, and its final model run
-  /// only repeats it. Nothing changes where every evaluation of it failed.
+  /// Makes the best of a search the best of the run: the search knows which of several equal evaluations it took, and
+  /// its final model run only repeats that one. Does nothing if every evaluation failed.
   void takeBestOf(const SearchSummary& search);
 
   const std::optional<BestEvaluation>& best() const { return best_.best(); }
-  /// The number of the initial evaluation; nothing before one has succeeded.
+  /// The number of the initial evaluation; empty before an evaluation has succeeded.
   const std::optional<int>& initial() const { return initial_.number(); }
 
   int evaluationCount() const { return evaluationCount_; }
@@ -61,7 +61,7 @@ class RunReporter final : public EvaluationObserver {
     std::vector<double> parameterValues;
     std::vector<double> objectiveValues;
   };
-  /// `values` on the model scale.
+  /// `values` are on the model scale.
   void recordSeries(const std::vector<double>& values, const EvaluationResult& result);
   void count(const std::vector<double>& parameterValues, const EvaluationResult& result, std::string_view foundAt);
   void considerAsBest(int number, double aggregate, const std::vector<double>& parameterValues,

@@ -10,7 +10,7 @@
 
 namespace mirevo {
 
-/// What a run has once, owned by the run driver and handed down.
+/// The state that all parts of a run share, owned by the run driver and passed to them.
 struct RunState {
   std::unique_ptr<Job> job = std::make_unique<SingleProcess>();
   int mpiRank = -1;  ///< -1 without MPI, 0 the master, above 0 a worker
@@ -18,7 +18,7 @@ struct RunState {
   bool mpiInUse = false;
   RunLog log;
   ProgressReporter progress{runTimeClock};
-  std::vector<double> objectiveValues;  ///< of the last model run, one an objective function
+  std::vector<double> objectiveValues;  ///< of the last model run, one per objective function
 };
 
 }  // namespace mirevo

@@ -17,14 +17,14 @@
 namespace mirevo {
 namespace {
 
-/// Handlers run here, so that a stack overflow can still be reported.
+/// The stack of the handlers, so that a stack overflow can still be reported.
 alignas(16) std::array<char, 65536> handlerStack;
 
-/// "Mirevo: ", ready for the handlers.
+/// "Mirevo: ", prepared for the handlers.
 std::array<char, 64> boxTitle;
 std::size_t boxTitleLength = 0;
 
-/// What stands in the record of the run before the message of a handler that ends it, ready for the handlers.
+/// The text before a handler's message in the record of the run, prepared for the handlers.
 struct RecordedEnding {
   std::array<char, 64> text;
   std::size_t length = 0;
@@ -35,7 +35,7 @@ struct RecordedEnding {
 RecordedEnding endingOnRequest;
 RecordedEnding endingInCrash;
 
-/// Writes to a terminal or pipe, but never waits for one that takes nothing (a stopped terminal).
+/// Writes to a terminal or pipe, unless it accepts nothing at present (a stopped terminal).
 void showFromSignal(int descriptor, std::string_view text, std::string_view title) noexcept {
   pollfd ready{descriptor, POLLOUT, 0};
   if (::poll(&ready, 1, 0) == 1 && (ready.revents & POLLOUT) != 0) writeLineFromSignal(descriptor, text, title);
@@ -48,7 +48,7 @@ bool isRequest(int signalNumber) noexcept {
 [[noreturn]] void endRun(int signalNumber, std::string_view message) noexcept {
   const int terminationLog = signalState.terminationLogUnit;
   if (terminationLog > 0) writeLineFromSignal(terminationLog, message);
-  // The log holds the reason before the model's processes are ended.
+  // The reason is in the log before the model processes are ended.
   if (const int runLog = signalState.runLogDescriptor; runLog >= 0) {
     writeLineFromSignal(runLog, "");
     writeLineFromSignal(runLog, message);
@@ -91,8 +91,8 @@ extern "C" void handleSignal(int signalNumber, siginfo_t*, void*) {
   endRun(signalNumber, messageOf(signalNumber));
 }
 
-/// A library's thread may be given what is sent to the process. In the middle of a step of the main thread, which holds
-/// such signals, it hands it on to that one.
+/// The signal may be delivered to a thread of a library. If the main thread is holding signals back during a step, that
+/// thread passes the signal on to the main thread.
 extern "C" void handleRequest(int signalNumber, siginfo_t*, void*) {
   signalState.isEnding = true;
   const pid_t process = ::getpid();
@@ -105,7 +105,8 @@ extern "C" void handleFloatingPoint(int signalNumber, siginfo_t* information, vo
   const int subCode = floatingPointSubCode(information->si_code);
   if (subCode == fpe::kUnderflow) {
 #if defined(__x86_64__)
-    // The instruction is repeated on return: without masking the underflow trap it would end here again for ever.
+    // The instruction is repeated on return: unless the underflow trap is masked, it would raise the signal again for
+    // ever.
     constexpr unsigned kUnderflowAndDenormalMask = 0x0900;
     auto* registers = static_cast<ucontext_t*>(context)->uc_mcontext.fpregs;
     if (registers != nullptr) registers->mxcsr |= kUnderflowAndDenormalMask;
@@ -119,7 +120,7 @@ extern "C" void handleFloatingPoint(int signalNumber, siginfo_t* information, vo
 
 using SignalAction = void (*)(int, siginfo_t*, void*);
 
-/// Whoever started the program may have blocked the signal.
+/// Also unblocks the signal, which the caller of the program may have blocked.
 void install(int signalNumber, SignalAction handler) {
   struct sigaction action {};
   action.sa_sigaction = handler;
@@ -200,7 +201,7 @@ void installSignalHandlers() {
   for (const int signalNumber : {SIGHUP, SIGQUIT, SIGXCPU}) {
     if (!isIgnored(signalNumber)) install(signalNumber, handleRequest);
   }
-  // A reader of our output that goes away, or a limit on file sizes: the write that fails says so.
+  // If a reader of our output goes away, or a file-size limit is reached, the write fails with an error instead.
   ::signal(SIGPIPE, SIG_IGN);
   ::signal(SIGXFSZ, SIG_IGN);
 }

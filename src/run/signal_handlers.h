@@ -6,9 +6,8 @@
 namespace mirevo {
 
 /// Installs the handlers that turn a crash or an interrupt into a logged end without processes left behind. Reads
-/// BUILDMODE and G48 as they stand now. A hang-up, a quit key and a spent processor time end the run like a termination
-/// request, the first two unless they are ignored already (nohup, a script's background); a bus error is an illegal
-/// storage access.
+/// BUILDMODE and G48 at this time. SIGHUP, SIGQUIT and SIGXCPU end the run like a termination request, the first two
+/// unless they are ignored already (nohup, a script's background); SIGBUS counts as an illegal storage access.
 void installSignalHandlers();
 
 /// Sub-codes of a floating-point signal.
@@ -22,7 +21,7 @@ inline constexpr int kInexact = 134;
 inline constexpr int kOther = 0;
 }  // namespace fpe
 
-/// The sub-code that a SIGFPE's `si_code` stands for. This platform reports denormalized operands as underflow.
+/// The sub-code for the `si_code` of a SIGFPE. This platform reports denormalized operands as underflow.
 int floatingPointSubCode(int signalCode) noexcept;
 
 /// The message of a floating-point sub-code.

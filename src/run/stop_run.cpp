@@ -19,7 +19,7 @@ void setTerminationLogUnit(int unit) {
 
 std::string openTerminationLog(const std::string& path) {
   if (signalState.terminationLogUnit > 0) return {};
-  // Removed rather than emptied: an earlier run that is just ending writes its last line into what it has made.
+  // Removed rather than emptied: an earlier run that is just ending then writes its last line to its own file.
   ::unlink(path.c_str());
   const int unit = ::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_APPEND | O_CLOEXEC, 0666);
   if (unit < 0) return fmt::format("Unable to open termination log: {}: {}", path, std::strerror(errno));
@@ -28,7 +28,7 @@ std::string openTerminationLog(const std::string& path) {
 }
 
 void stopRun(int exitCode) {
-  const EndingSignalsHeld held;  // to the end of the process: what is said here is the last word
+  const EndingSignalsHeld held;  // until the end of the process: nothing may be written after the completion line
   if (const int unit = signalState.terminationLogUnit; unit > 0) {
     writeLineFromSignal(unit, exitCode != 0 ? "Abnormal completion" : "Successful completion");
   }

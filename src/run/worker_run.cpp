@@ -18,14 +18,14 @@
 namespace mirevo {
 namespace {
 
-/// For the farewell to be taken; the master is waiting for it.
+/// Time for the master, which waits for it, to receive the farewell.
 constexpr double kFarewellSeconds = 30.0;
 
-/// Works until the master says stop; when this returns, the model's processes are gone.
+/// Works until the master sends stop; the model processes have ended when it returns.
 void work(Job& job) {
   const auto begin = awaitBegin(job);
   if (!begin) return;
-  RunLog unread;  // the master's log has all of it
+  RunLog unread;  // discarded: the master's log has all of it
   const RunConfig config = readSetup(begin->setupFile, begin->text, unread, true);
   ParameterModel parameters(config.parameters, config.constraints);
   ObjectiveAggregator aggregator(config.objectives, config.aggregationMethod);
@@ -51,7 +51,7 @@ void workOrReport(Job& job) {
 
 int runWorker(Job& job) {
   installSignalHandlers();
-  // The master says it once for all of them.
+  // The master shows messages, once for all processes.
   signalState.showsMessageBox = false;
   signalState.writesStandardOutput = false;
   try {
@@ -60,7 +60,7 @@ int runWorker(Job& job) {
     job.finalise(kFarewellSeconds);
     return 0;
   } catch (const FatalError& error) {
-    // Nobody can be told any more but whoever reads this.
+    // The master cannot be reached any more.
     showMessage(fmt::format("Worker {}: {}\n{}", job.rank(), error.message(), error.detail()));
     job.abort(1);
     return 1;

@@ -8,11 +8,12 @@
 namespace mirevo {
 namespace {
 
-constexpr double kLogarithmicRatio = 100.0;  ///< of the largest to the smallest value
+constexpr double kLogarithmicRatio = 100.0;  ///< ratio of the largest to the smallest value from which the scale is
+                                             ///< logarithmic
 constexpr int kFewestColumns = 10;
 constexpr int kFewestRows = 3;
 
-/// The strokes that the staircase is drawn with.
+/// The characters with which the staircase is drawn.
 struct Strokes {
   std::string_view flat, upright, leaveDown, arriveDown, leaveUp, arriveUp, axis, tick;
 };
@@ -28,10 +29,10 @@ class Scale {
     top_ = largest->aggregate;
     isLogarithmic_ = bottom_ > 0.0 && top_ / bottom_ >= kLogarithmicRatio;
   }
-  /// The row of a value, 0 the highest; all the same value lies in the middle.
+  /// The row of a value, 0 at the top; the middle row if all values are equal.
   int row(double value, int rows) const {
     if (!(top_ > bottom_)) return rows / 2;
-    // Halved first: the span of two finite numbers need not be finite.
+    // Halved first, as the difference of two finite numbers may overflow.
     const double part = isLogarithmic_ ? std::log(value / bottom_) / std::log(top_ / bottom_)
                                        : (value / 2.0 - bottom_ / 2.0) / (top_ / 2.0 - bottom_ / 2.0);
     return static_cast<int>(std::lround((1.0 - std::clamp(part, 0.0, 1.0)) * (rows - 1)));

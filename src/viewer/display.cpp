@@ -29,7 +29,7 @@ std::string_view styleSequence(LineStyle style) {
   return {};
 }
 
-/// Redrawn only where it has changed, so that a slow line is not kept busy for days.
+/// Redraws only if something has changed, so that a slow connection is not kept busy.
 class ScreenDisplay final : public Display {
  public:
   bool isScreen() const override { return true; }
@@ -61,7 +61,7 @@ class ScreenDisplay final : public Display {
     const TerminalScreen::Size size = TerminalScreen::size();
     std::vector<ScreenLine> lines = layoutScreen(state, situation, {size.columns, size.rows - 1}, characters_);
     screen_.leave();
-    lines.pop_back();  // the keys
+    lines.pop_back();  // the line of the keys
     while (!lines.empty() && lines.back().text.empty()) lines.pop_back();
     std::string text;
     for (const ScreenLine& line : lines) text.append(line.text).append("\n");
@@ -75,7 +75,7 @@ class ScreenDisplay final : public Display {
   std::string shown_;
 };
 
-/// Every message a line, and how far the run is once a minute while that changes.
+/// One line per message, and once a minute the progress of the run if it has changed.
 class LineDisplay final : public Display {
  public:
   bool isScreen() const override { return false; }
@@ -128,7 +128,7 @@ std::string screenText(const std::vector<ScreenLine>& lines, bool withColour) {
   for (std::size_t i = 0; i < lines.size(); ++i) {
     const std::string_view style = withColour ? styleSequence(lines[i].style) : std::string_view{};
     if (i > 0) text += "\r\n";
-    // Cleared before it is written: behind a line that fills the row the cursor stands on its last column.
+    // Cleared before it is written: after a line that fills the row the cursor is still on its last column.
     text.append("\x1b[2K").append(style).append(lines[i].text);
     if (!style.empty()) text += "\x1b[0m";
   }

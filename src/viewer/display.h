@@ -8,7 +8,7 @@
 
 namespace mirevo {
 
-/// Where a viewer shows a run: a terminal's screen, or lines one after another.
+/// Where a viewer shows a run: on a terminal's screen, or as lines one after another.
 class Display {
  public:
   Display() = default;
@@ -16,22 +16,22 @@ class Display {
   Display& operator=(const Display&) = delete;
   virtual ~Display() = default;
 
-  /// Whether the user can look at it for as long as he likes, so that a run that has ended stays in view.
+  /// Whether it is a screen, on which a run that has ended stays in view until the user leaves.
   virtual bool isScreen() const = 0;
-  /// Shows the state; `newMessages` have come since the last time. False when nobody can see it any more.
+  /// Shows the state; `newMessages` are those since the last call. False when nobody can see it any more.
   virtual bool show(const ProgressState& state, const ViewerSituation& situation,
                     const std::vector<std::string>& newMessages) = 0;
-  /// Stops this process as the terminal's user wants it, until he continues it.
+  /// Suspends this process (Ctrl-Z) until the user continues it.
   virtual void suspend() = 0;
-  /// Takes the terminal anew, after this process was stopped and the shell had it meanwhile.
+  /// Takes the terminal back after this process was suspended.
   virtual void resume() = 0;
-  /// Draws everything again at the next show(), whatever has become of the screen.
+  /// Makes the next show() draw the whole screen.
   virtual void redraw() = 0;
-  /// Gives the terminal back, and leaves there how things stand.
+  /// Restores the terminal and leaves the final state of the run on it.
   virtual void close(const ProgressState& state, const ViewerSituation& situation) = 0;
 };
 
-/// The screen where standard output is a terminal that can show one, else lines.
+/// The screen if standard input and output are a terminal that can show one, else lines.
 std::unique_ptr<Display> openDisplay();
 
 /// The bytes that draw `lines`, one for every row of the screen.

@@ -25,7 +25,7 @@ bool isIn(const std::array<Range, n>& ranges, char32_t code) {
 /// C0 and C1 controls, line and paragraph separators, directional marks and the byte order mark.
 constexpr std::array<Range, 6> kUnprintable{
     {{0, 0x1F}, {0x7F, 0x9F}, {0x200E, 0x200F}, {0x2028, 0x202E}, {0x2060, 0x206F}, {0xFEFF, 0xFEFF}}};
-/// Marks that stand upon the character before, and joiners (Unicode categories Mn and Cf, the usual scripts).
+/// Combining marks and joiners (Unicode categories Mn and Cf, the usual scripts).
 constexpr std::array<Range, 5> kNoWidth{
     {{0x300, 0x36F}, {0x200B, 0x200D}, {0x1AB0, 0x1AFF}, {0x20D0, 0x20FF}, {0xFE00, 0xFE0F}}};
 /// Two columns wide (Unicode East Asian Width W and F, in blocks).
@@ -101,7 +101,7 @@ std::string padded(std::string_view text, int width, CharacterSet characters) {
 }
 
 std::string durationText(double seconds) {
-  constexpr double kLongest = 1e12;  // so that the whole seconds fit their type, whatever a file says
+  constexpr double kLongest = 1e12;  // so that whole seconds fit into their type, whatever is in the file
   const auto whole = static_cast<std::int64_t>(std::clamp(std::isfinite(seconds) ? seconds : 0.0, 0.0, kLongest));
   const std::int64_t minutes = whole / 60;
   const std::int64_t hours = minutes / 60;

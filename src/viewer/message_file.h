@@ -8,13 +8,13 @@
 
 namespace mirevo {
 
-/// Follows a message file as it grows, and notices that another run has begun it anew. It is opened for each look, so
-/// that what other machines of a network file system wrote is seen, and a file that was replaced.
+/// Follows a message file as it grows, and notices when another run has started it afresh. The file is opened for every
+/// look, so that a replaced file and what other machines wrote to a network file system are seen.
 class MessageFile final {
  public:
   explicit MessageFile(std::string path) : path_(std::move(path)) {}
 
-  /// Feeds at most one piece of what is new to `records`. True when there is more to read at once.
+  /// Feeds at most one piece of what is new to `records`. True when there is more to read already.
   bool readPiece(ProgressRecords& records, std::vector<std::string>* messages = nullptr);
 
  private:

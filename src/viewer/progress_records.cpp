@@ -107,7 +107,7 @@ void ProgressRecords::addNotice(std::string_view text) {
   state_.isLatestMessageNotice = true;
 }
 
-/// False for a message to be noticed: about no evaluation, or about one that failed.
+/// False for a message that is not routine: one that is not about an evaluation, or about a failed one.
 bool ProgressRecords::takeEvaluationMessage(std::string_view text) {
   using progress::EvaluationNews;
   const auto news = progress::readEvaluationMessage(text);
@@ -122,8 +122,8 @@ bool ProgressRecords::takeEvaluationMessage(std::string_view text) {
   return true;
 }
 
-/// A search that improves in ever smaller steps makes more points than a screen can show: every second is dropped when
-/// there are too many, and as many fewer are kept from then on.
+/// A search that improves in ever smaller steps makes more points than a screen can show. When there are too many,
+/// every second one is dropped, and from then on half as many are kept.
 void ProgressRecords::addCoursePoint() {
   std::vector<ProgressState::CoursePoint>& course = state_.course;
   if (!course.empty() && skippedCoursePoints_ < coursePointsToSkip_) {

@@ -10,14 +10,14 @@
 namespace mirevo {
 
 /// Builds up a ProgressState from the bytes of a message file, in pieces of any size. The records are described in
-/// docs/progress-format.md; a line that is none is passed over, and whatever the bytes, the memory used is bounded.
+/// docs/progress-format.md; lines that are not records are skipped, and the memory used is bounded whatever the bytes.
 class ProgressRecords final {
  public:
   /// Takes the next bytes of the file, written at `time` (seconds since 1970). The messages among them are appended to
-  /// `messages` where that is given. A line is taken once its end is there.
+  /// `messages`, if given. A line is used once it is complete.
   void feed(std::string_view bytes, double time, std::vector<std::string>* messages = nullptr);
 
-  /// Adds a message that came another way.
+  /// Adds a message from another source.
   void addNotice(std::string_view text);
 
   /// Forgets everything: another run has begun.
@@ -34,7 +34,7 @@ class ProgressRecords final {
 
   ProgressState state_;
   std::string unfinishedLine_;
-  std::size_t coursePointsToSkip_ = 0;  ///< between two that are kept
+  std::size_t coursePointsToSkip_ = 0;  ///< between two kept points
   std::size_t skippedCoursePoints_ = 0;
 };
 

@@ -19,7 +19,7 @@
 namespace mirevo {
 namespace {
 
-/// Forgets what came while the signal was blocked.
+/// Discards signals that came while the signal was blocked.
 void dropPending(int signalNumber) {
   struct sigaction before {};
   ::sigaction(signalNumber, nullptr, &before);
@@ -27,10 +27,10 @@ void dropPending(int signalNumber) {
   ::sigaction(signalNumber, &before, nullptr);
 }
 
-/// The run's side: away from the terminal, what it prints into the pipe, its records into the message file.
+/// The run's side of the fork: leaves the terminal, prints to the pipe, and writes its records to the message file.
 void becomeRun(int output, const sigset_t& blockedBefore, const std::function<void()>& prepare) {
   ::setsid();
-  // What the terminal sent to both while they were one is the viewer's.
+  // Signals that the terminal sent before the fork are for the viewer.
   for (const int signalNumber : {SIGINT, SIGQUIT, SIGHUP}) dropPending(signalNumber);
   ::signal(SIGPIPE, SIG_IGN);
   if (const int nothing = ::open("/dev/null", O_RDONLY | O_CLOEXEC); nothing >= 0) {
@@ -48,9 +48,9 @@ void becomeRun(int output, const sigset_t& blockedBefore, const std::function<vo
 
 int qmonStart(const std::string& setupFile, const std::function<void()>& prepare, const std::function<void()>& run) {
   std::array<int, 2> pipe{-1, -1};
-  // Whoever started the program may have it ignored, and the run's end would never be told.
+  // If the caller of the program ignores it, the end of the run would not be reported.
   ::signal(SIGCHLD, SIG_DFL);
-  // A signal of the first moment waits for the viewer, which passes it on: it must not end the viewer alone.
+  // Early signals wait until the viewer can pass them on: they must not end the viewer alone.
   const sigset_t blockedBefore = SignalQueue::block();
   const pid_t process = ::pipe2(pipe.data(), O_CLOEXEC | O_NONBLOCK) == 0 ? ::fork() : -1;
   if (process > 0) {

@@ -43,7 +43,7 @@ std::optional<int> RunProcess::exitCode() {
   if (ended == process_) {
     exitCode_ = WIFSIGNALED(status) ? 128 + WTERMSIG(status) : WEXITSTATUS(status);
   } else if (ended < 0 && errno == ECHILD) {
-    exitCode_ = kUnknownExitCode;  // it has ended, and somebody else was told how
+    exitCode_ = kUnknownExitCode;  // it has ended and was reaped elsewhere
   }
   return exitCode_;
 }

@@ -10,11 +10,11 @@
 namespace mirevo {
 namespace {
 
-constexpr int kRoomyRows = 20;    ///< from here on blank lines set the blocks apart
-constexpr int kWideColumns = 64;  ///< from here on two facts stand side by side
+constexpr int kRoomyRows = 20;    ///< from this size on blank lines separate the blocks
+constexpr int kWideColumns = 64;  ///< from this size on there are two facts per line
 constexpr int kFewestPlotRows = 4;
 constexpr int kMostPlotRows = 24;
-constexpr int kNarrowColumns = 50;  ///< below it labels and values are shortened
+constexpr int kNarrowColumns = 50;  ///< below this size labels and values are shortened
 constexpr int kLabelColumns = 13;
 constexpr int kNarrowLabelColumns = 10;
 constexpr double kQuietSeconds = 60.0;
@@ -24,11 +24,11 @@ struct Fact {
   std::string value;
 };
 
-/// "4 of 40, 1 failed", or with what it is that is counted: "4 of 40 evaluations, 1 failed".
+/// "4 of 40, 1 failed", or with the noun: "4 of 40 evaluations, 1 failed".
 std::string evaluationsText(const ProgressState& state, bool withNoun = false) {
   if (state.countLabel.empty()) return "none yet";
   std::string text = fmt::format("{}", state.done);
-  // A search that works in loops ends the one in which it has done what was planned.
+  // The count in the message file may exceed the plan.
   const bool isBeyondPlan = state.planned && state.done > *state.planned;
   if (state.planned && !isBeyondPlan) text += fmt::format(" of {}", *state.planned);
   if (withNoun) text += text == "1" || text == "1 of 1" ? " evaluation" : " evaluations";
@@ -58,7 +58,7 @@ std::string runningForText(const ProgressState& state, const ViewerSituation& si
                       *state.origin.startedAt);
 }
 
-/// In the order of their worth.
+/// In order of importance.
 std::vector<Fact> factsOf(const ProgressState& state, const ViewerSituation& situation, bool isNarrow) {
   const bool isRunning = situation.presence == RunPresence::running;
   return {{isNarrow ? "Runs" : "Evaluations", evaluationsText(state)},
@@ -68,7 +68,7 @@ std::vector<Fact> factsOf(const ProgressState& state, const ViewerSituation& sit
           {isRunning ? isNarrow ? "Running" : "Running for" : "Ran for", runningForText(state, situation)}};
 }
 
-/// "running, no news for 2 h" where evaluations used to come faster.
+/// "running, no news for 2 h" if evaluations came faster before.
 std::string presenceText(const ProgressState& state, const ViewerSituation& situation) {
   switch (situation.presence) {
     case RunPresence::awaited:
@@ -86,7 +86,7 @@ std::string presenceText(const ProgressState& state, const ViewerSituation& situ
   return quiet > std::max(kQuietSeconds, usual) ? fmt::format("{}, no news for {}", text, durationText(quiet)) : text;
 }
 
-/// The first of the texts that fits, else the last.
+/// The first text that fits, or the last.
 std::string firstThatFits(std::initializer_list<std::string_view> texts, int width) {
   for (const std::string_view text : texts) {
     if (displayWidth(text) <= width) return std::string(text);
@@ -119,7 +119,7 @@ class Screen {
 
   int columns() const { return size_.columns; }
   CharacterSet characters() const { return characters_; }
-  /// Rows that are still free, one kept for the keys.
+  /// Rows that are still free, except the one for the keys.
   int freeRows() const { return size_.rows - 1 - static_cast<int>(lines_.size()); }
   void add(std::string_view text, LineStyle style = LineStyle::plain) {
     if (freeRows() > 0) lines_.push_back({fitted(printable(text, characters_), size_.columns, characters_), style});
@@ -154,7 +154,8 @@ void addHeading(Screen& screen, const ProgressState& state, const ViewerSituatio
   if (!state.task.empty() && hasRoom) screen.add(state.task);
 }
 
-/// A run ends with 100 per cent whatever the reason; one that was cut short has come as far as its evaluations.
+/// The records of a run end with 100 per cent whatever the reason; for a run that was cut short this is computed from
+/// its evaluations instead.
 std::optional<double> percentReached(const ProgressState& state) {
   const bool wasCutShort = !state.ending.empty() && state.ending != progress::kNormalTermination;
   if (!wasCutShort) return state.percent;
@@ -238,7 +239,7 @@ std::vector<ScreenLine> layoutScreen(const ProgressState& state, const ViewerSit
   screen.addGap();
   addFacts(screen, state, situation);
   screen.addGap();
-  // Two thirds of what is left, and of little all but two lines of messages.
+  // Two thirds of the free rows; if there are few, all but two for messages.
   const int left = screen.freeRows();
   const int plotRows = std::min(kMostPlotRows, std::max(left * 2 / 3, std::min(left - 2, 6)));
   if (plotRows >= kFewestPlotRows) {

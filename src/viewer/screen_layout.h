@@ -9,27 +9,27 @@
 
 namespace mirevo {
 
-/// How it stands with the run that a viewer looks at.
+/// State of the run that a viewer shows.
 enum class RunPresence {
-  awaited,  ///< there is no message file of it yet
+  awaited,  ///< it has no message file yet
   running,
-  vanished,  ///< its process is gone, and it has not said how it ended
+  vanished,  ///< its process is gone without having said how it ended
   ended
 };
 
-/// What the viewer itself adds to the state of the run.
+/// What the viewer adds to the state of the run.
 struct ViewerSituation {
-  std::string setupName;  ///< in place of a title that is not known
+  std::string setupName;  ///< shown while the title is not known
   RunPresence presence = RunPresence::awaited;
   bool wasStarted = false;       ///< by this viewer
   bool asksToCancel = false;     ///< the question is on the screen
-  bool cancelRequested = false;  ///< the kill file was made
-  std::string problem;           ///< why it could not be made
-  std::string runsLastWords;     ///< the latest line that a started run has printed
-  std::optional<int> exitCode;   ///< of a started run that has ended
+  bool cancelRequested = false;  ///< the kill file was created
+  std::string problem;           ///< why it could not be created
+  std::string runsLastWords;     ///< the latest line printed by a run that this viewer started
+  std::optional<int> exitCode;   ///< of a run that this viewer started and that has ended
   double now = 0.0;              ///< seconds since 1970
 
-  /// A started run can be cancelled from its first moment on, another one once it is there.
+  /// A run that this viewer started can be cancelled from its first moment on, another one while it is running.
   bool canBeCancelled() const {
     return presence == RunPresence::running || (presence == RunPresence::awaited && wasStarted);
   }
@@ -47,18 +47,18 @@ struct ScreenLine {
   LineStyle style = LineStyle::plain;
 };
 
-/// The screen: at most `size.rows` lines of at most `size.columns` columns, the keys in the last one. What matters less
-/// is left out first where there is little room.
+/// The screen: at most `size.rows` lines of at most `size.columns` columns, with the keys in the last one. Where there
+/// is little room the less important lines are left out first.
 std::vector<ScreenLine> layoutScreen(const ProgressState& state, const ViewerSituation& situation, ScreenSize size,
                                      CharacterSet characters);
 
-/// The same in one line, for an output that is no screen.
+/// The same in one line, for an output that is not a screen.
 std::string progressLine(const ProgressState& state, const ViewerSituation& situation);
 
-/// How the run ended, or that it is gone; empty while it is neither.
+/// How the run ended, or that it is gone; empty otherwise.
 std::string outcomeText(const ProgressState& state, const ViewerSituation& situation);
 
-/// Of a setup that has no message file yet.
+/// For a setup that has no message file yet.
 inline constexpr std::string_view kNoRunYet = "No run of this setup so far; waiting for one.";
 
 /// The question before a run is cancelled.

@@ -22,7 +22,7 @@ namespace {
 
 constexpr int kLookMilliseconds = 500;
 constexpr int kPiecesAtATime = 64;
-constexpr std::size_t kEarlierMessages = 20;  ///< shown as lines of a run that has been going before
+constexpr std::size_t kEarlierMessages = 20;  ///< shown as lines, of a run that began before the viewer
 constexpr std::size_t kKeptOutput = 65'536;
 constexpr char kControlC = 3;
 constexpr char kControlL = 12;
@@ -56,7 +56,7 @@ Viewer::Viewer(std::string setupFile, std::unique_ptr<RunProcess> started)
 }
 
 const ProgressState& Viewer::state() const {
-  // Until the started run has begun its message file, what stands there is of an earlier run.
+  // Until the started run has begun its message file, the file is that of an earlier run.
   static const ProgressState kNothingYet;
   if (started_ && records_.state().origin.process != started_->process()) return kNothingYet;
   return records_.state();
@@ -82,8 +82,8 @@ bool Viewer::showNews() {
   return isSeen;
 }
 
-/// A run that came with its viewer is over with its process; of another one's end a screen stays until its user leaves,
-/// where there is one.
+/// For a run that this viewer started the viewer ends with the run's process. After the end of another run a screen
+/// stays until the user leaves, if there is one.
 bool Viewer::isOver() const {
   if (hasMore_) return false;
   const bool hasEnded = situation_.presence == RunPresence::ended || situation_.presence == RunPresence::vanished;
@@ -91,7 +91,7 @@ bool Viewer::isOver() const {
 }
 
 void Viewer::readNews() {
-  // Asked before the records are read: a run that has just ended has written its last ones.
+  // Checked before the records are read, so that the last records of a run that has just ended are included.
   const ProgressState& before = records_.state();
   const bool isGone = started_ ? started_->exitCode().has_value()
                                : before.origin.process > 0 && before.origin.host == host_ &&
@@ -151,7 +151,7 @@ void Viewer::takeSignals() {
     if (signal == SIGWINCH) display_->redraw();
     if (signal == SIGCONT) display_->resume();
     if (signal == SIGINT && started_ && !display_->isScreen() && !hasKeyboard()) {
-      started_->send(SIGINT);  // nobody can be asked
+      started_->send(SIGINT);  // nobody can be asked to confirm
     } else if (signal == SIGINT) {
       takeKey(kControlC);
     }
@@ -174,7 +174,7 @@ void Viewer::takeKeys() {
     leaves_ = leaves_ || display_->isScreen();  // the terminal is gone
     return;
   }
-  // Cursor and function keys come as an escape sequence, of which no letter must count as a key.
+  // Cursor and function keys arrive as an escape sequence, whose letters must not count as keys.
   if (keys[0] == '\x1b') return situation_.asksToCancel ? takeKey(' ') : void();
   for (ssize_t i = 0; i < count; ++i) takeKey(keys[static_cast<std::size_t>(i)]);
 }
@@ -198,7 +198,7 @@ void Viewer::takeKey(char key) {
   }
 }
 
-/// With nothing to cancel it is the key to leave.
+/// If there is nothing to cancel, the key leaves the viewer.
 void Viewer::takeCancelKey() {
   if (situation_.canBeCancelled()) {
     situation_.asksToCancel = !situation_.cancelRequested;
@@ -209,8 +209,7 @@ void Viewer::takeCancelKey() {
 
 void Viewer::cancelRun() {
   if (situation_.presence == RunPresence::awaited) {
-    // Before it has begun, a kill file would not be its own: it would cancel another run of the setup that it waits
-    // for.
+    // Before the run has begun, a kill file could cancel another run of the setup, for whose end it waits.
     if (started_) started_->send(SIGTERM);
     situation_.cancelRequested = true;
     return;

@@ -12,20 +12,20 @@
 
 namespace mirevo {
 
-/// Shows a run to a person until it ends or the person leaves. It reads the run's message file, and makes its kill file
-/// when that is asked for and confirmed; nothing else of it reaches the run.
+/// Shows a run until it ends or the user leaves. It reads the run's message file and creates its kill file when the
+/// user asks for that and confirms; it affects the run in no other way.
 class Viewer final {
  public:
-  /// `setupFile` as given on the command line, with or without ".kdx". `started` is the run that came with the viewer,
-  /// null for one that goes on its own.
+  /// `setupFile` as given on the command line, with or without ".kdx". `started` is the run that was started with the
+  /// viewer, null for any other.
   Viewer(std::string setupFile, std::unique_ptr<RunProcess> started);
 
-  /// The exit code: that of the started run when it was watched to its end, else 0.
+  /// Returns the exit code: that of the started run if it was watched to its end, else 0.
   int watch();
 
  private:
   void readNews();
-  /// False when nobody sees it any more.
+  /// False when nobody can see it any more.
   bool showNews();
   void readRunOutput();
   void judgePresence(bool processIsGone);
@@ -40,7 +40,7 @@ class Viewer final {
   void sayGoodbye() const;
 
   std::string setupFile_;
-  std::string baseName_;  ///< the run's files begin with it
+  std::string baseName_;  ///< the beginning of the paths of the run's files
   std::string host_;
   std::unique_ptr<RunProcess> started_;
   MessageFile file_;
@@ -49,14 +49,14 @@ class Viewer final {
   SignalQueue signals_;
   std::unique_ptr<Display> display_;
   std::vector<std::string> newMessages_;
-  std::string runOutput_;     ///< of the started run, its end when it is long
-  bool hasCaughtUp_ = false;  ///< with what the file held when the viewer began; nothing is shown before
+  std::string runOutput_;     ///< of the started run; its last part if it is long
+  bool hasCaughtUp_ = false;  ///< with what the file held when the viewer started; nothing is shown before
   bool hasMore_ = false;
   bool keysEnded_ = false;
   bool leaves_ = false;
 };
 
-/// The path of a setup without ".kdx"; the run's log or message file stands for it as well.
+/// The path of a setup without ".kdx"; `setupFile` may also be the run's log or message file.
 std::string baseNameOfSetup(std::string_view setupFile);
 
 }  // namespace mirevo

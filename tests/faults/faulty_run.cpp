@@ -11,13 +11,23 @@ namespace fs = std::filesystem;
 
 /// The outputs of an "earlier run": each must be found again, under this name or a numbered one.
 const std::vector<std::string>& earlierFiles() {
-  static const std::vector<std::string> names = {"basin.log",           "basin.dat",          "basin_Optimisation.dat",
-                                                 "calSimErr.dat",       "basin_Band_1.csv",   "basin_Sensitivity.dat",
-                                                 "basin_Run.dat",       "basin_Failures.dat", "basin_Quantiles.dat",
-                                                 "basin_Saved/1/a.csv", "basin_Process1/old", "basin._kill_"};
+  static const std::vector<std::string> names = {"basin.log",
+                                                 "basin.dat",
+                                                 "basin_Optimisation.dat",
+                                                 "calSimErr.dat",
+                                                 "basin_Band_1.csv",
+                                                 "basin_Sensitivity.dat",
+                                                 "basin_Run.dat",
+                                                 "basin_Failures.dat",
+                                                 "basin_Quantiles.dat",
+                                                 "basin_Optimisation_Failures.dat",
+                                                 "basin_Sensitivity_Run.dat",
+                                                 "basin_Saved/1/a.csv",
+                                                 "basin_Process1/old",
+                                                 "basin._kill_"};
   return names;
 }
-constexpr std::size_t kKeptEarlierFiles = 10;
+constexpr std::size_t kKeptEarlierFiles = 12;
 
 std::string excerpt(const std::string& text) {
   return text.size() < 600 ? text : text.substr(0, 300) + " ... " + text.substr(text.size() - 300);
@@ -112,9 +122,10 @@ RunningProgram FaultyRun::start(const Environment& environment, const std::vecto
 
 std::map<std::string, std::string> FaultyRun::outputs() const {
   std::map<std::string, std::string> found;
+  const std::string failures = resultFileName_.substr(0, resultFileName_.rfind('.')) + "_Failures.dat";
   for (const std::string& name :
-       {std::string("calSimErr.dat"), std::string("basin_Failures.dat"), std::string("basin_Band_1.csv"),
-        std::string("basin_Quantiles.dat"), std::string("basin_Covariance.dat"), resultFileName_}) {
+       {std::string("calSimErr.dat"), failures, std::string("basin_Band_1.csv"), std::string("basin_Quantiles.dat"),
+        std::string("basin_Covariance.dat"), resultFileName_}) {
     if (folder_.exists(name)) found[name] = withoutDates(folder_.read(name));
   }
   if (!folder_.exists("basin_Saved")) return found;

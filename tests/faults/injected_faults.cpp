@@ -54,8 +54,8 @@ constexpr std::pair<const char*, const char*> kKinds[] = {{"_Restart.dat", "rest
                                                           {"basin._spi_", "message file"},
                                                           {"basin._kill_", "kill file"},
                                                           {"calSimErr", "failed-run file"},
-                                                          {"basin_Failures", "failure table"},
-                                                          {"basin_Run.", "run record"},
+                                                          {"_Failures.", "failure table"},
+                                                          {"_Run.", "run record"},
                                                           {"basin_Saved", "saved output files"},
                                                           {"basin_Band_", "band file"},
                                                           {"basin_Sensitivity", "sensitivity file"},
@@ -157,7 +157,7 @@ Expectation expectationOf(const Fault& fault, const FaultyRun& run) {
   // The kind of the setup file is looked at before anything is made beside it, the log included.
   expected.logMayLackMessage = kind == "run log" || (kind == "setup file" && fault.call.first == "stat");
   expected.mayFailEvaluation = kind == "simulated series" || kind == "starting processes" || kind == "batch log";
-  expected.mayBeToldInReport = (kind == "series file" || kind == "failure table") &&
+  expected.mayBeToldInReport = (kind == "series file" || kind == "failure table" || kind == "run record") &&
                                (fault.call.first == "read" || fault.call.first == "open-to-read");
   expected.mayBeToldBehindLog = kind == "message file";  // its last records follow the log's end
   // Making a folder goes on without knowing what is there, and fails for what is missing.

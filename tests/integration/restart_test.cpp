@@ -111,17 +111,23 @@ TEST_F(Restart, ARaisedBudgetTakesAFinishedSearchFurther) {
 }
 
 TEST_F(Restart, GoesOnThoughAnotherTaskWasRunInBetween) {
-  writeSetup({});
+  const auto files = [this](const std::string& task) {
+    return withoutDates(folder_.read("basin_" + task + ".dat")) + folder_.read("basin_" + task + "_Failures.dat");
+  };
+  writeSetup({.modelArguments = "--fail-above 7.4"});
   run();
+  const std::string search = files("Optimisation");
   const std::string expected = results();
-  writeSetup({.option = 1});
+  writeSetup({.option = 1, .modelArguments = "--fail-above 4.01"});
+  run(1);
+  const std::string analysis = files("Sensitivity") + folder_.read("basin_Sensitivity_Run.dat");
+  const std::string told = folder_.read("calSimErr.dat");
+  writeSetup({.modelArguments = "--fail-above 7.4"});
+  folder_.write(resultFile_, expected.substr(0, expected.find("\n30\t") + 5));
   run();
-  const std::string analysis = folder_.read("basin_Run.dat");
-  writeSetup({});
-  folder_.write(resultFile_, expected.substr(0, expected.find("\n12\t") + 5));
-  run();
-  EXPECT_EQ(results(), expected);
-  EXPECT_EQ(folder_.read("basin_Run.2.dat"), analysis);
+  EXPECT_EQ(files("Optimisation"), search);
+  EXPECT_EQ(files("Sensitivity") + folder_.read("basin_Sensitivity_Run.dat"), analysis);
+  EXPECT_EQ(folder_.read("calSimErr.2.dat"), told);
 }
 
 TEST_F(Restart, ARaisedBudgetIsANewSearchOfDds) {

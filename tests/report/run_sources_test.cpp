@@ -28,7 +28,7 @@ TEST(FailureReasons, AreGroupedWhereTheyDifferInNumbersAlone) {
   add(12, "/x/basin_Process17/out.csv: Evaluation No. 4", {"not shown"});
   add(13, "cut off");
   folder.write("basin_Failures.dat", text.substr(0, text.size() - 2));
-  const auto source = readFailures(folder / "basin");
+  const auto source = readFailures(folder / "basin", run_files::kPlain);
   ASSERT_TRUE(source.content.has_value());
   const auto reasons = groupFailures(*source.content);
   ASSERT_EQ(reasons.size(), 2U);
@@ -37,7 +37,7 @@ TEST(FailureReasons, AreGroupedWhereTheyDifferInNumbersAlone) {
   EXPECT_EQ(reasons[0].example, "Evaluation 7: /x/basin_Process2/out.csv: Evaluation No. 1");
   EXPECT_EQ(reasons[1].count, 1);
   EXPECT_EQ(reasons[1].example, "Evaluation 3: run.sh exited with code 3\n2\n3\n4\n5\n\n7");
-  const auto missing = readFailures(folder / "other");
+  const auto missing = readFailures(folder / "other", run_files::kPlain);
   EXPECT_FALSE(missing.content.has_value());
   EXPECT_EQ(missing.file + ": " + missing.reason, "other_Failures.dat: No such file or directory");
 }
@@ -53,11 +53,13 @@ TEST(ReportedCovariance, IsThatOfTheAnalysisToTheLastBit) {
   const ParameterCovariance covariance = parameterCovariance(model);
   const std::vector<DataTable> tables = covarianceTables(covariance, space, space.initial);
   const TemporaryFolder folder;
-  EXPECT_FALSE(reportedCovariance(folder / "basin"));
+  std::string fault;
+  EXPECT_FALSE(reportedCovariance(folder / "basin", fault));
+  EXPECT_EQ(fault, "") << "there is none";
   for (const DataTable& table : tables) {
-    folder.write(fileNameOf(dataTablePath("basin", table.name)), dataTableText(table));
+    folder.write(runFilePath("basin", table.file), dataTableText(table));
   }
-  const auto reported = reportedCovariance(folder / "basin");
+  const auto reported = reportedCovariance(folder / "basin", fault);
   ASSERT_TRUE(reported.has_value());
   EXPECT_THAT(reported->names, ElementsAre(space.names[0], space.names[2]));
   EXPECT_THAT(reported->leftOut, ElementsAre(space.names[1]));
@@ -69,7 +71,8 @@ TEST(ReportedCovariance, IsThatOfTheAnalysisToTheLastBit) {
   EXPECT_THAT(reported->upper95, ElementsAre(limits[0].upper, limits[1].upper));
 
   folder.write("basin_Correlation.dat", dataTableHead(tables[1]));
-  EXPECT_FALSE(reportedCovariance(folder / "basin")) << "cut off: all of it or nothing";
+  EXPECT_FALSE(reportedCovariance(folder / "basin", fault));
+  EXPECT_NE(fault, "") << "cut off: all of it or nothing";
 }
 
 }  // namespace

@@ -19,11 +19,11 @@ namespace {
 constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
 constexpr double kWarnAboveCorrelation = 0.95;
 
-/// Squared length of a column of length 1 that is left when the columns before it are taken out of it. Differences of a
-/// model's output carry no more than 6 to 8 digits, so that anything smaller is their noise.
+/// Smallest squared length of a column of length 1 that must remain after projecting out the columns before it.
+/// Differences of a model's output have no more than 6 to 8 digits, so that anything smaller is noise.
 constexpr double kSmallestPivot = 1.0e-12;
 
-/// Square root of W times J and r, without the rows that have no residual.
+/// W^(1/2) J and W^(1/2) r, without the rows that have no residual.
 struct WeightedModel {
   std::vector<std::vector<double>> columns;
   std::vector<double> residuals;
@@ -50,8 +50,8 @@ double dot(std::span<const double> a, std::span<const double> b) {
   return sum;
 }
 
-/// Scales a column to length 1 and returns the length it had, by way of its largest entry, so that squares neither
-/// overflow nor vanish. Leaves a zero column as it is.
+/// Scales a column to length 1 and returns its former length. Divides by the largest entry first, so that squares
+/// neither overflow nor underflow. Leaves a zero column unchanged.
 double normalise(std::vector<double>& column) {
   double largest = 0.0;
   for (const double value : column) largest = std::max(largest, std::abs(value));
@@ -62,7 +62,7 @@ double normalise(std::vector<double>& column) {
   return largest * length;
 }
 
-/// J'WJ of the given normalised columns, k x k; its diagonal is 1.
+/// J'WJ of the kept columns, which are normalised: k x k, with 1 on the diagonal.
 std::vector<double> gramMatrix(const std::vector<std::vector<double>>& columns, std::span<const std::size_t> kept) {
   const std::size_t k = kept.size();
   std::vector<double> gram(k * k);
@@ -74,8 +74,8 @@ std::vector<double> gramMatrix(const std::vector<std::vector<double>>& columns, 
   return gram;
 }
 
-/// Factorises the Gram matrix in place; the 0-based position of the first parameter that depends on those before it, or
-/// k when there is none.
+/// Factorises the Gram matrix in place. Returns the 0-based index of the first column that depends on those before it,
+/// or k when there is none.
 std::size_t factorise(std::vector<double>& gram, std::size_t k) {
   const int n = static_cast<int>(k);
   int info = 0;
@@ -89,7 +89,7 @@ std::size_t factorise(std::vector<double>& gram, std::size_t k) {
   return sound;
 }
 
-/// Removes what cannot have a variance, and leaves the inverse of the Gram matrix of the rest.
+/// Leaves out the parameters that cannot have a variance and returns the inverse of the Gram matrix of the others.
 std::vector<double> invertWhatCanBe(const WeightedModel& weighted, std::span<const double> lengths,
                                     ParameterCovariance& result) {
   for (std::size_t j = 0; j < lengths.size(); ++j) {
@@ -147,7 +147,7 @@ ParameterCovariance parameterCovariance(const LinearisedModel& model) {
   result.correlation.assign(k, std::vector<double>(k, 1.0));
   for (std::size_t i = 0; i < k; ++i) {
     for (std::size_t j = 0; j <= i; ++j) {
-      // The upper triangle in Fortran's order of columns.
+      // DPOTRI fills the upper triangle, in Fortran's column order.
       const double entry = inverse[i * k + j];
       const double scale = lengths[result.kept[i]] * lengths[result.kept[j]];
       result.covariance[i][j] = result.covariance[j][i] = result.errorVariance * entry / scale;
@@ -169,7 +169,7 @@ std::vector<ParameterLimits> parameterLimits(const ParameterCovariance& covarian
     const std::size_t j = covariance.kept[i];
     const double deviation = covariance.standardDeviations[i];
     const double reach = covariance.tQuantile * deviation;
-    // An integer parameter's limits are not moved to whole numbers: they are those of a continuous quantity.
+    // The limits of an integer parameter are not rounded to integers: they are those of a continuous quantity.
     if (space.transformation[j] == TransformationType::logarithmic) {
       const double value = std::exp(set[j]);
       limits.push_back({value, value * deviation, std::exp(set[j] - reach), std::exp(set[j] + reach)});
@@ -191,7 +191,7 @@ std::vector<DataTable> covarianceTables(const ParameterCovariance& covariance, c
   tables.push_back(
       matrixTable(run_files::kCorrelation, "Correlation of the parameters", names, covariance.correlation));
   DataTable& limits = tables.emplace_back();
-  limits.name = tableName(run_files::kParameterLimits);
+  limits.file = run_files::kParameterLimits;
   limits.headLines = {"Estimate, standard deviation and 95 % limits of each parameter, model scale"};
   limits.columns = {"Parameter", "Estimate", "StandardDeviation", "Lower95", "Upper95", "LeftOut"};
   const std::vector<ParameterLimits> found = parameterLimits(covariance, space, set);
@@ -208,7 +208,7 @@ std::vector<DataTable> covarianceTables(const ParameterCovariance& covariance, c
 DataTable jacobianTable(const LinearisedModel& model, const SearchSpace& space,
                         std::span<const ObservationLabel> observations) {
   DataTable table;
-  table.name = tableName(run_files::kJacobian);
+  table.file = run_files::kJacobian;
   table.headLines = {
       "Derivatives of the simulated values by the parameters, search scale; the residual is the simulated "
       "less the observed value, the weight that of its square"};

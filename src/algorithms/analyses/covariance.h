@@ -23,25 +23,25 @@ struct LeftOutParameter {
   std::string reason;
 };
 
-/// The covariance matrix s^2 (J'WJ)^-1 of the parameters that have one, with s^2 = r'Wr / (n - p); search scale.
+/// The covariance matrix s^2 (J'WJ)^-1 of the parameters that have one, with s^2 = r'Wr / (n - k); search scale.
 struct ParameterCovariance {
   std::vector<std::size_t> kept;  ///< k parameters, ascending; the matrices and vectors below have their order
   std::vector<LeftOutParameter> leftOut;
   std::size_t observationCount = 0;  ///< n, rows with a NaN not counted
   std::size_t degreesOfFreedom = 0;  ///< n - k
-  double errorVariance = 0.0;        ///< s^2; NaN, with all that follows, when there is no degree of freedom
+  double errorVariance = 0.0;        ///< s^2; NaN, with all that follows, when there are no degrees of freedom
   std::vector<std::vector<double>> covariance;
   std::vector<std::vector<double>> correlation;
   std::vector<double> standardDeviations;
   double tQuantile = 0.0;  ///< 97.5 % quantile of Student's t
 };
 
-/// By Cholesky factorisation of the scaled matrix (DPOTRF, DPOTRI). A parameter whose column is zero or not finite, or
-/// depends on those of the parameters before it, is left out with its reason.
+/// By Cholesky factorisation of the scaled matrix (DPOTRF, DPOTRI). A parameter whose column is zero, not finite, or a
+/// linear combination of the columns before it is left out, with the reason.
 ParameterCovariance parameterCovariance(const LinearisedModel& model);
 
-/// One parameter on the model scale. The limits are the search scale's, transformed; the standard deviation is carried
-/// over by the derivative of the transformation (delta method).
+/// One parameter on the model scale. The limits are computed on the search scale and transformed back; the standard
+/// deviation follows from the derivative of the transformation (delta method).
 struct ParameterLimits {
   double value = 0.0;
   double standardDeviation = 0.0;
@@ -49,23 +49,24 @@ struct ParameterLimits {
   double upper = 0.0;
 };
 
-/// One entry a kept parameter; `set` is the set at which the model was linearised, on the search scale.
+/// One entry per kept parameter; `set` is the parameter set at which the model was linearised, on the search scale.
 std::vector<ParameterLimits> parameterLimits(const ParameterCovariance& covariance, const SearchSpace& space,
                                              std::span<const double> set);
 
-/// The same for programs: covariance matrix (search scale), correlation matrix, limits of the parameters (model scale)
-/// with the reasons of those left out. None where there are not more observations than parameters.
+/// The analysis as tables for programs: covariance matrix (search scale), correlation matrix, and limits of the
+/// parameters (model scale) with the reasons why some are left out. No tables unless there are more observations than
+/// parameters.
 std::vector<DataTable> covarianceTables(const ParameterCovariance& covariance, const SearchSpace& space,
                                         std::span<const double> set);
 
-/// Which observation a row of a linearised model is of.
+/// The observation that a row of a linearised model belongs to.
 struct ObservationLabel {
   std::string measure;
   std::string time;
 };
 
-/// The linearised model for programs, one row per observation that counts: its weight in W, its residual and its
-/// derivatives on the search scale. `observations` has one entry per row of the model.
+/// The linearised model as a table for programs, one row per observation that counts: its weight in W, its residual and
+/// its derivatives on the search scale. `observations` has one entry per row of the model.
 DataTable jacobianTable(const LinearisedModel& model, const SearchSpace& space,
                         std::span<const ObservationLabel> observations);
 

@@ -28,7 +28,7 @@ struct Step {
 Step wantedStep(const SensitivitySettings& settings, const SearchSpace& space, std::span<const double> base,
                 std::size_t j) {
   const TransformationType type = space.transformation[j];
-  // The search space's upper bound of an integer parameter lies one above the largest value.
+  // The upper bound of an integer parameter in the search space is one above its largest value.
   const double upper = type == TransformationType::integer ? space.upper[j] - 1.0 : space.upper[j];
   const double fraction = settings.perturbationFraction;
   Step step;
@@ -38,7 +38,7 @@ Step wantedStep(const SensitivitySettings& settings, const SearchSpace& space, s
     step.extent = upper - space.lower[j];
     step.up = step.down = fraction * step.extent;
   } else if (type == TransformationType::logarithmic) {
-    // x (1 + f) and x / (1 + f): the same step either way. The derivative by ln x is already x times that by x.
+    // x (1 + f) and x / (1 + f): the same step in both directions. dy/d ln x already equals x dy/dx.
     step.extent = 1.0;
     step.up = step.down = std::log1p(fraction);
   } else {
@@ -53,7 +53,7 @@ Step wantedStep(const SensitivitySettings& settings, const SearchSpace& space, s
   return step;
 }
 
-/// Adds the sets that the differences by parameter j need.
+/// Adds the sets that are needed for the difference with respect to parameter j.
 ParameterDifference planDifference(const Step& step, bool central, std::size_t j, std::vector<ParameterSet>& sets) {
   const auto addSet = [&](double value) {
     sets.push_back(sets.front());
@@ -82,7 +82,7 @@ ParameterDifference planDifference(const Step& step, bool central, std::size_t j
     difference.problem = "its bounds are equal";
     return difference;
   }
-  // The width as rounded, so that it is that of the sets that are run.
+  // The width after rounding, which is that of the sets that are run.
   difference.width = sets[difference.plus][j] - sets[difference.minus][j];
   if (!(difference.width > 0.0)) difference.problem = "the perturbation is too small to change its value";
   return difference;
@@ -237,7 +237,7 @@ std::optional<LinearisedModel> linearise(const PerturbationPlan& plan,
 
 std::vector<DataTable> sensitivityTables(const LocalSensitivity& sensitivity, const AnalysisNames& names) {
   DataTable table;
-  table.name = tableName(run_files::kSensitivities);
+  table.file = run_files::kSensitivities;
   table.headLines = {
       "Derivatives on the search scale, and dimensionless: times the extent of the parameter, over the "
       "size of the output; the composite is their root mean square over all outputs of a kind"};

@@ -28,37 +28,39 @@ struct SensitivitySettings {
 /// The section LOCAL_SA.
 const SettingSection<SensitivitySettings>& localSensitivitySection();
 
-/// The two sets whose difference gives the derivatives by one parameter.
+/// The two parameter sets whose difference gives the derivatives with respect to one parameter.
 struct ParameterDifference {
   std::size_t minus = 0;  ///< 0-based among the sets; 0 is the base set
   std::size_t plus = 0;
-  double width = 0.0;   ///< value of the parameter in `plus` less that in `minus`, search scale; 0: not perturbed
+  double width = 0.0;   ///< value of the parameter in `plus` minus that in `minus`, search scale; 0: not perturbed
   double extent = 0.0;  ///< what scales the derivatives: the range or the value, search scale
-  std::string problem;  ///< why there are no derivatives; empty when there are
+  std::string problem;  ///< why there are no derivatives; empty when there are some
 };
 
-/// All sets of an analysis, the base set first, and how to take differences of their results.
+/// All parameter sets of an analysis, the base set first, and which differences of their results to take.
 struct PerturbationPlan {
   std::vector<ParameterSet> sets;
-  std::vector<ParameterDifference> differences;  ///< one a variable parameter
+  std::vector<ParameterDifference> differences;  ///< one per variable parameter
 };
 
 /// Perturbs each parameter of `base` by the fraction of its range on the search scale, or of its value on the model
-/// scale (of a logarithmic parameter x to x (1 + fraction)); an integer parameter by whole steps, one at least. Where
-/// one side lies outside the bounds the difference is one-sided, inwards, and shorter where neither side has room.
+/// scale (a logarithmic parameter x becomes x (1 + fraction)); an integer parameter moves by whole steps, at least one.
+/// Where a step would leave the bounds the difference is one-sided, inwards; where neither side has room the step is
+/// shortened.
 PerturbationPlan planPerturbations(const SensitivitySettings& settings, const SearchSpace& space,
                                    std::span<const double> base);
 
-/// Whether parameter j has room for its whole step, one way at least, from the space's initial value.
+/// Whether parameter j has room for its whole step from the initial value of the space in at least one direction.
 bool hasRoomForStep(const SensitivitySettings& settings, const SearchSpace& space, std::size_t j);
 
-/// Derivatives of m outputs by p parameters, and what follows from them.
+/// Derivatives of m outputs with respect to p parameters, and what follows from them.
 struct SensitivityTable {
   std::vector<double> base;                      ///< the outputs of the base set, m
   std::vector<std::vector<double>> derivatives;  ///< p rows of m, search scale; NaN where unknown
-  /// Dimensionless: derivative times the parameter's extent, over the size of the output; NaN where that is 0.
+  /// Dimensionless: derivative times the parameter's extent, divided by the absolute value of the output; NaN where
+  /// that is 0.
   std::vector<std::vector<double>> scaled;
-  std::vector<double> composite;  ///< root mean square of the scaled ones that are known, one a parameter
+  std::vector<double> composite;  ///< root mean square of the known scaled derivatives, one per parameter
 };
 
 struct LocalSensitivity {
@@ -66,8 +68,8 @@ struct LocalSensitivity {
   std::vector<EvaluationResult> results;
   SensitivityTable measures;
   SensitivityTable objectives;
-  /// 0-based parameters, the most sensitive first by the objective functions' composite (the output measures' where
-  /// there is no objective function); equal ones in setup order, those without one last.
+  /// 0-based parameters, the most sensitive first, by the composite of the objective functions (of the output measures
+  /// where there is no objective function); ties in setup order, parameters without a composite last.
   std::vector<std::size_t> ranking;
 };
 
@@ -75,7 +77,7 @@ struct LocalSensitivity {
 /// parameter's derivatives out, with the reason in the plan.
 LocalSensitivity localSensitivity(const SensitivitySettings& settings, const SearchSpace& space, Evaluator& evaluator);
 
-/// The derivatives of any output by differences, p columns of one row a value: NaN for a parameter with a problem.
+/// The derivatives of any outputs by differences: p columns, one row per value; NaN for a parameter with a problem.
 /// `outputs[i]` are the values of set i; those of a failed set may be empty.
 std::vector<std::vector<double>> differenceColumns(const PerturbationPlan& plan,
                                                    std::span<const std::vector<double>> outputs);
@@ -86,8 +88,8 @@ std::optional<LinearisedModel> linearise(const PerturbationPlan& plan,
                                          std::span<const std::vector<double>> simulatedValues,
                                          std::span<const double> observedValues, std::vector<double> weights);
 
-/// The same for programs: one row per parameter and output with derivative, scaled sensitivity, the parameter's
-/// composite over all outputs of that kind, and why there is none.
+/// The analysis as tables for programs: one row per parameter and output with the derivative, the scaled sensitivity,
+/// the composite of the parameter over all outputs of that kind, and the reason where there is none.
 std::vector<DataTable> sensitivityTables(const LocalSensitivity& sensitivity, const AnalysisNames& names);
 
 /// The analysis as lines of text for the log.

@@ -13,7 +13,7 @@
 namespace mirevo {
 namespace {
 
-/// With the digits of a series' 32-bit values.
+/// With the digits of the 32-bit values of a series.
 std::string cell(double value) {
   return std::isfinite(value) ? fmt::format("{}", static_cast<float>(value)) : "NaN";
 }

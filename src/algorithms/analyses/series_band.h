@@ -13,15 +13,15 @@ namespace mirevo {
 
 /// The 5-95 % band of a simulated series at the times of its observations.
 struct SeriesBand {
-  std::vector<double> lower;         ///< 5 % quantile (type 7), one an observation; NaN without a simulated value
+  std::vector<double> lower;         ///< 5 % quantile (type 7), one per observation; NaN without a simulated value
   std::vector<double> median;        ///< 50 % quantile
   std::vector<double> upper;         ///< 95 % quantile
   std::size_t observationCount = 0;  ///< observations that have a band
-  double shareInside = 0.0;          ///< of those, bounds included; NaN when there is none
+  double shareInside = 0.0;          ///< share of those inside the band, limits included; NaN when there are none
 };
 
-/// The band over the evaluations that succeeded, of the series whose simulated values begin at `first` in theirs;
-/// `observed` holds its observations. Values that are not finite are left out.
+/// The band over the successful evaluations for the series whose simulated values begin at index `first` of each
+/// evaluation's simulated values; `observed` holds its observations. Values that are not finite are left out.
 SeriesBand seriesBand(std::span<const double> observed, std::span<const EvaluationResult> results, std::size_t first);
 
 /// The band as a time-series file: the columns time, observed, 5 %, 50 % and 95 %, one row per observation.

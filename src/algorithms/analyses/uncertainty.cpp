@@ -14,8 +14,8 @@ namespace mirevo {
 
 namespace {
 
-/// Moves deviate i into stratum (pi_i - 1, pi_i) / N, pi_i being its rank among the deviates, from 1, equal ones by
-/// index.
+/// Replaces deviate i by a random value in the stratum (pi_i - 1, pi_i) / N, where pi_i is its rank among the deviates,
+/// from 1; ties by index.
 void stratify(std::vector<double>& deviates, UniformGenerator& random) {
   std::vector<std::size_t> order(deviates.size());
   std::iota(order.begin(), order.end(), std::size_t{0});
@@ -26,7 +26,7 @@ void stratify(std::vector<double>& deviates, UniformGenerator& random) {
   for (std::size_t i = 0; i < deviates.size(); ++i) deviates[i] = (static_cast<double>(rank[i]) - random.next()) / n;
 }
 
-/// One summary a column; `column(i)` gives evaluation i's values.
+/// One summary per column; `valuesOf(i)` returns the values of evaluation i.
 template <typename ValuesOf>
 std::vector<SampleSummary> summariseColumns(std::size_t count, const ValuesOf& valuesOf) {
   std::vector<std::vector<double>> columns;
@@ -143,7 +143,7 @@ UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome) {
 
 std::vector<DataTable> uncertaintyTables(const UncertaintySummary& summary, const AnalysisNames& names) {
   DataTable table;
-  table.name = tableName(run_files::kQuantiles);
+  table.file = run_files::kQuantiles;
   table.headLines = {
       "Parameters on the search scale, of all sets drawn; measures and objective functions of those whose "
       "model run succeeded"};

@@ -13,7 +13,7 @@
 
 namespace mirevo {
 
-/// The distribution of one variable parameter, on the search scale: of a logarithmic parameter that of its logarithm.
+/// The distribution of one variable parameter on the search scale; for a logarithmic parameter that of its logarithm.
 struct NormalDistribution {
   double mean = 0.0;
   double standardDeviation = 0.0;
@@ -28,7 +28,7 @@ struct UncertaintySettings {
   std::vector<NormalDistribution> parameters;  ///< one per variable parameter, in setup order
 };
 
-/// The section UNCERTAINTY_ESTIMATION, and the seed of the run that it shares with the initial sample.
+/// The section UNCERTAINTY_ESTIMATION, and the seed of the run, which the initial sample sets, too.
 struct UncertaintySection {
   UncertaintySettings& settings;
   std::int32_t& randomSeed;
@@ -37,8 +37,8 @@ const SettingSection<UncertaintySection>& uncertaintySection();
 /// Its sections PARAMETER_n.
 const SettingSection<NormalDistribution>& distributionSection();
 
-/// N sets drawn from independent normal distributions, not held against the bounds. The stream starts anew from the
-/// seed, whose sign does not matter. A deviate that has no quantile is reported to `messages` and yields the mean.
+/// N sets drawn from independent normal distributions, not checked against the bounds. The stream starts afresh from
+/// the seed, whose sign does not matter. A deviate that has no quantile is reported to `messages` and yields the mean.
 std::vector<ParameterSet> uncertaintySample(const UncertaintySettings& settings, std::int32_t seed,
                                             const MessageSink& messages = {});
 
@@ -48,12 +48,13 @@ struct UncertaintyOutcome {
   std::vector<EvaluationResult> results;
 };
 
-/// Draws the sample and evaluates it in one batch (an empty one where there is no variable parameter). Aggregates are
-/// not settled from the sample: nothing here uses them, and a constant objective function must not end the analysis.
+/// Draws the sample and evaluates it in one batch (an empty one where there is no variable parameter). The scale of the
+/// objective functions is not taken from the sample: no aggregate is used here, and a constant objective function must
+/// not end the analysis.
 UncertaintyOutcome uncertaintyAnalysis(const UncertaintySettings& settings, std::int32_t seed, Evaluator& evaluator,
                                        const MessageSink& messages = {});
 
-/// Names of what an analysis reports, for its tables; each in setup order.
+/// Names of what an analysis reports, for its tables; each list in setup order.
 struct AnalysisNames {
   std::vector<std::string> parameters;
   std::vector<std::string> measures;
@@ -71,8 +72,8 @@ struct UncertaintySummary {
 
 UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome);
 
-/// The same for programs: mean, standard deviation and quantiles of each parameter (search scale), measure and
-/// objective function; the correlation of the parameters of the sample.
+/// The summary as tables for programs: mean, standard deviation and quantiles of each parameter (search scale), measure
+/// and objective function; the correlation of the sampled parameters.
 std::vector<DataTable> uncertaintyTables(const UncertaintySummary& summary, const AnalysisNames& names);
 
 /// The summary as lines of text for the log.

@@ -4,18 +4,18 @@
 extern "C" {
 /// Cholesky factor of the symmetric positive definite `a` (n by n); info > 0 when it is not positive definite.
 void dpotrf_(const char* uplo, const int* n, double* a, const int* lda, int* info);
-/// Solves a·x = b for `rightSides` columns of b, from the factor of dpotrf.
+/// Solves a·x = b for `rightSides` columns of b, with the factor of dpotrf.
 void dpotrs_(const char* uplo, const int* n, const int* rightSides, const double* a, const int* lda, double* b,
              const int* ldb, int* info);
-/// The inverse (lower triangle) from the factor of dpotrf, in its place.
+/// Overwrites the factor of dpotrf with the inverse, in the same triangle.
 void dpotri_(const char* uplo, const int* n, double* a, const int* lda, int* info);
-/// Of OpenBLAS alone, where LAPACK is its.
+/// Exists only where OpenBLAS provides LAPACK.
 void openblas_set_num_threads(int count) __attribute__((weak));
 }
 
 namespace mirevo {
 
-/// One thread for LAPACK: its results must not depend on how many cores a machine has, and the cores are the model's.
+/// Limits LAPACK to one thread: its results must not depend on the number of cores, and the cores are for the model.
 inline void useOneLapackThread() {
   if (openblas_set_num_threads != nullptr) openblas_set_num_threads(1);
 }
@@ -28,7 +28,7 @@ inline bool choleskyFactor(double* matrix, int n) {
   return info == 0;
 }
 
-/// Solves for one right side, in place, from the factor of choleskyFactor().
+/// Solves for one right-hand side, in place, with the factor of choleskyFactor().
 inline void choleskySolve(const double* factor, int n, double* rightSide) {
   const int one = 1;
   int info = 0;

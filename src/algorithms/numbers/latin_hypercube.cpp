@@ -7,7 +7,7 @@
 namespace mirevo {
 namespace {
 
-/// A uniformly random order of 0..count−1 (Fisher and Yates).
+/// A random permutation of 0..count−1 (Fisher and Yates).
 std::vector<std::size_t> randomOrder(std::size_t count, UniformGenerator& random) {
   std::vector<std::size_t> order(count);
   std::iota(order.begin(), order.end(), std::size_t{0});

@@ -85,7 +85,7 @@ std::vector<std::vector<double>> correlationMatrix(std::span<const std::vector<d
 DataTable matrixTable(const RunFile& file, std::string headLine, std::span<const std::string> names,
                       std::span<const std::vector<double>> matrix) {
   DataTable table;
-  table.name = tableName(file);
+  table.file = file;
   table.headLines = {std::move(headLine)};
   table.columns = {"Parameter"};
   table.columns.insert(table.columns.end(), names.begin(), names.end());

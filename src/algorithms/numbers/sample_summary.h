@@ -13,11 +13,11 @@ namespace mirevo {
 /// The probabilities of the quantiles that summaries give.
 inline constexpr std::array kSummaryProbabilities{0.05, 0.25, 0.50, 0.75, 0.95};
 
-/// What a sample of one quantity looks like. Statistics that its size does not allow are NaN.
+/// Statistics of a sample of one quantity. Those for which the sample is too small are NaN.
 struct SampleSummary {
   std::size_t count = 0;  ///< finite values; the others are left out
   double mean = 0.0;
-  double standardDeviation = 0.0;                                ///< with n - 1
+  double standardDeviation = 0.0;                                ///< divisor n - 1
   std::array<double, kSummaryProbabilities.size()> quantiles{};  ///< at kSummaryProbabilities
 };
 
@@ -27,7 +27,8 @@ SampleSummary summariseSample(std::span<const double> values);
 /// (n - 1) p: type 7 of Hyndman and Fan (1996), doi:10.1080/00031305.1996.10473566. NaN without a value.
 double sortedQuantile(std::span<const double> ascending, double probability);
 
-/// The sample correlation of two series of one length; NaN where one of them is constant or shorter than 2.
+/// The sample correlation of two samples of equal length; NaN if one of them is constant or they have fewer than 2
+/// values.
 double sampleCorrelation(std::span<const double> a, std::span<const double> b);
 
 /// The correlation matrix of the columns of `rows` (n rows of p values each), p x p, with 1 on the diagonal.
@@ -37,8 +38,8 @@ std::vector<std::vector<double>> correlationMatrix(std::span<const std::vector<d
 DataTable matrixTable(const RunFile& file, std::string headLine, std::span<const std::string> names,
                       std::span<const std::vector<double>> matrix);
 
-/// A table as lines of text: names to the left, then one right-aligned column a heading, with six significant digits.
-/// `rows[i]` stands behind `names[i]`.
+/// A table as lines of text: names to the left, then one right-aligned column per heading, with six significant digits.
+/// `rows[i]` follows `names[i]`.
 std::vector<std::string> formatTable(const std::string& corner, std::span<const std::string> headings,
                                      std::span<const std::string> names, std::span<const std::vector<double>> rows);
 

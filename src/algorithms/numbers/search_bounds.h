@@ -7,13 +7,13 @@
 
 namespace mirevo {
 
-/// Bounds and start point on the search scale; one entry a variable parameter.
+/// Bounds and start point on the search scale; one entry per variable parameter.
 struct SearchBounds {
   std::vector<double> lower;
   std::vector<double> upper;
   std::vector<double> initial;
-  /// Of a parameter that the model takes in whole steps from the lower bound: values in between are truncated. Empty
-  /// where there is none.
+  /// Whether the model takes the parameter in whole steps from the lower bound; values in between are truncated. Empty
+  /// if there is no such parameter.
   std::vector<bool> isInteger{};
 
   std::size_t size() const { return lower.size(); }

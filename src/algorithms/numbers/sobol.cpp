@@ -13,7 +13,7 @@ namespace {
 
 constexpr int kDigits = 32;
 
-/// 32 random bits. A deviate of the run's stream has fewer good bits than that, so two of them are used, 16 bits each.
+/// 32 random bits. A deviate of the run's stream has fewer good bits, so two deviates give 16 bits each.
 std::uint32_t randomBits(UniformGenerator& random) {
   const auto high = static_cast<std::uint32_t>(random.next() * 65536.0) & 0xffffU;
   const auto low = static_cast<std::uint32_t>(random.next() * 65536.0) & 0xffffU;

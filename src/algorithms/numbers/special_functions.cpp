@@ -30,7 +30,7 @@ double polynomial(const std::array<double, n>& coefficients, double x) {
   return sum;
 }
 
-/// The published coefficients of PPND16: numerator and denominator near the middle, further out, and in the tails.
+/// The published coefficients of PPND16: numerator and denominator near the middle, further out and in the tails.
 constexpr std::array kCentralNumerator{3.3871328727963666080e0, 1.3314166789178437745e2, 1.9715909503065514427e3,
                                        1.3731693765509461125e4, 4.5921953931549871457e4, 6.7265770927008700853e4,
                                        3.3430575583588128105e4, 2.5090809287301226727e3};
@@ -105,7 +105,8 @@ double incompleteGammaSeries(double x, double shape, double logGammaOfShape, boo
 /// The continued fraction for the upper integral, x > 1 and x >= shape.
 double incompleteGammaFraction(double x, double shape, double logGammaOfShape, bool& converged) {
   converged = true;
-  // The fraction lies below 1, so that this bound settles the far tail, where its terms would overflow.
+  // The fraction lies below 1, so that this bound determines the result in the far tail, where its terms would
+  // overflow.
   const double bound = shape * std::log(x) - x - logGammaOfShape;
   if (bound < kSmallestExponent) return 1.0;
 

@@ -5,10 +5,10 @@
 
 namespace mirevo {
 
-/// Where a function writes its messages, one a call; an empty one drops them. Each message begins with a blank.
+/// Receives the messages of a function, one per call; an empty sink drops them. Each message begins with a blank.
 using MessageSink = std::function<void(std::string_view)>;
 
-/// Special functions in double precision. `fault` is set to 0 for success and 1 for a fault; a fault writes a message
+/// Special functions in double precision. `fault` is set to 0 for success and 1 for a fault; a fault sends a message
 /// and never stops the run. A NaN argument is a fault. Measured errors: docs/algorithms/special-functions.md.
 
 /// z with Phi(z) = p, by Wichura's algorithm AS 241 (PPND16, 1988, doi:10.2307/2347330). A fault with the result 0 for

@@ -22,7 +22,7 @@ constexpr CongruentialGenerator kThird{243000, 4561, 51349};
 static_assert(kFirst.largestProduct() <= INT32_MAX && kSecond.largestProduct() <= INT32_MAX &&
               kThird.largestProduct() <= INT32_MAX);
 
-/// The reciprocals of the first two moduli, deliberately as rounded to 32 bits: the stream depends on them.
+/// The reciprocals of the first two moduli, deliberately rounded to 32 bits: the stream depends on them.
 constexpr double kReciprocal1 = 3.8580246837227605e-6;
 constexpr double kReciprocal2 = 7.4373774623381905e-6;
 
@@ -48,8 +48,8 @@ double UniformGenerator::uniformDeviate(std::int32_t& idum) {
 }
 
 void UniformGenerator::initialise(std::int32_t idum) {
-  // In 64 bits, since the difference overflows 32 for the smallest idum. A first call may come with a positive idum;
-  // its remainder is made non-negative, so that the state is valid whatever the caller hands in.
+  // In 64 bits, since the difference overflows 32 bits for the smallest idum. The first call may have a positive idum;
+  // the remainder is made non-negative, so that the state is valid for any idum.
   const std::int64_t remainder = (std::int64_t{kFirst.increment} - idum) % kFirst.modulus;
   ix1_ = static_cast<std::int32_t>(remainder < 0 ? remainder + kFirst.modulus : remainder);
   ix1_ = kFirst.advance(ix1_);

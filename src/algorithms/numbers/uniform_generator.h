@@ -6,7 +6,7 @@
 namespace mirevo {
 
 /// The run's uniform random stream: three linear congruential generators with a shuffle table of 97 entries. The same
-/// seed gives the same stream on every machine. The state belongs to the object, so that two tasks never share one.
+/// seed gives the same stream on every machine. The state belongs to the object, so that no two tasks share it.
 class UniformGenerator final {
  public:
   /// The stream of a run: the sign of the seed does not matter.
@@ -15,7 +15,7 @@ class UniformGenerator final {
   /// The next deviate in (0, 1). The state can reach neither 0 nor 1 from any seed: docs/algorithms/random-numbers.md.
   double next() { return uniformDeviate(seedVariable_); }
 
-  /// The generator proper: a negative `idum`, or the first call, re-initialises it, after which `idum` is 1.
+  /// The generator itself: a negative `idum`, or the first call, initialises it, after which `idum` is 1.
   double uniformDeviate(std::int32_t& idum);
 
  private:

@@ -23,8 +23,7 @@ bool isUsable(const SearchBounds& bounds) {
   return true;
 }
 
-/// A NaN is worse than everything, so that neither a candidate without a value nor a start point without one can stay
-/// best.
+/// NaN is worse than every number, so that no point without a value can remain the best.
 bool isLess(double a, double b) {
   return !std::isnan(a) && (std::isnan(b) || a < b);
 }
@@ -69,7 +68,7 @@ SearchStatus Dds::advance() {
   std::vector<EvaluationResult> results = evaluator_.evaluateParameterSets({&candidate, 1}, DispatchMode::task);
   ++summary_.evaluationCount;
   ++summary_.loopCount;
-  // An equal value replaces the best on purpose: it lets the search drift along a plateau.
+  // Deliberately also for an equal value: the search can then drift along a plateau.
   if (isNotGreater(results.front().aggregate, summary_.bestResult.aggregate)) takeAsBest(candidate, results.front());
   checkBudget();
   return kSearchOk;
@@ -143,7 +142,7 @@ ParameterSet ddsCandidate(std::span<const double> best, const SearchBounds& boun
     if (deviate() < inclusionProbability) chosen.push_back(j);
   }
   if (chosen.empty()) {
-    // Counted from 1, as ceil(U n); a deviate of 0 means the first parameter, too.
+    // ceil(U n) counts from 1; a deviate of 0 also selects the first parameter.
     const double position = std::ceil(deviate() * static_cast<double>(n));
     chosen.push_back(std::min(static_cast<std::size_t>(std::max(position, 1.0)), n) - 1);
   }
@@ -177,10 +176,6 @@ BoundSection DdsMethod::section() {
   return {section, *this};
 }
 
-std::vector<SearchAdvice> DdsMethod::advice(std::size_t /*n*/) const {
-  return {};
-}
-
 std::string_view DdsMethod::budgetRefusal() const {
   return "Error: Maximum No. of model evaluations in DDS algorithm invalid";
 }
@@ -190,7 +185,7 @@ RaisedBudget DdsMethod::raiseBudget(const SearchHistory& history, const Stopping
   RaisedBudget raised;
   const bool isFirst = history.searches.empty();
   const int before = isFirst ? 0 : history.searches.back().lastEvaluation;
-  if (history.evaluations <= before) return raised;  // it had not begun
+  if (history.evaluations <= before) return raised;  // the latest search had not begun
   const int startPoints = isFirst && evaluatesSample(sample) ? ddsStartPointCount(history.budget) : 1;
   const int last = std::min(history.budget, std::max(history.evaluations, before + startPoints));
   raised.earlier = EarlierSearch{history.budget, last};
@@ -210,15 +205,16 @@ std::unique_ptr<SearchAlgorithm> DdsMethod::make(SearchProblem problem) const {
 }
 
 SearchSummary DdsMethod::run(SearchProblem problem, const PeriodicStep& /*periodicStep*/) const {
-  bool startsFromInitial = problem.initialSample.includeInitialParameters;
+  const std::vector<EarlierSearch> earlier = std::exchange(problem.earlierSearches, {});
+  const std::int32_t budget = problem.stopping.maxEvaluations;
   int made = 0;
-  for (const EarlierSearch& earlier : problem.earlierSearches) {
-    Dds search(settings, earlier.maxEvaluations - made, startsFromInitial, problem.bounds, problem.evaluator,
-               problem.random);
-    problem.bounds.initial = runSearch(search, facts().name.name, {}, earlier.lastEvaluation - made).best;
-    startsFromInitial = true;
-    made = earlier.lastEvaluation;
+  for (const EarlierSearch& search : earlier) {
+    problem.stopping.maxEvaluations = search.maxEvaluations;
+    problem.bounds.initial = runSearch(*make(problem), facts().name.name, {}, search.lastEvaluation - made).best;
+    problem.earlierSearches.push_back(search);
+    made = search.lastEvaluation;
   }
+  problem.stopping.maxEvaluations = budget;
   return SearchMethod::run(std::move(problem), {});
 }
 

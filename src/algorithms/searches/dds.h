@@ -17,12 +17,13 @@ struct DdsSettings {
 /// Dynamically Dimensioned Search after Tolson and Shoemaker (2007), doi:10.1029/2005WR004723. One candidate at a time:
 /// the best set with some parameters perturbed, ever fewer of them as the budget is used up.
 ///
-/// Differs from the paper in that the start points count as evaluations in the inclusion probability, that a point
-/// reflected past the opposite bound lands on the bound that it violated first, and that each normal deviate throws
-/// its twin of the polar method away.
+/// Differs from the paper in three ways: the start points count as evaluations in the inclusion probability, a point
+/// reflected past the opposite bound is set to the bound that it violated first, and of the two normal deviates that
+/// the polar method yields one is discarded.
 class Dds final : public SearchAlgorithm {
  public:
-  /// `maxEvaluations` (m) is the whole budget, start points included. The evaluator and the stream must outlive this.
+  /// `maxEvaluations` (m) is the whole budget, start points included. The evaluator and the stream must outlive the
+  /// object.
   Dds(DdsSettings settings, int maxEvaluations, bool startFromInitial, SearchBounds bounds, Evaluator& evaluator,
       UniformGenerator& random);
 
@@ -51,7 +52,7 @@ class Dds final : public SearchAlgorithm {
 
 inline constexpr SearchStatus kDdsInvalidInput = 1;
 
-/// Uniform deviates in [0, 1), one a call.
+/// Uniform deviates in [0, 1), one per call.
 using DeviateSource = std::function<double()>;
 
 /// Number of random start points for a budget of m >= 1 evaluations: max(5, 0.005 m), never more than m.
@@ -61,31 +62,30 @@ int ddsStartPointCount(int maxEvaluations);
 /// parameter; 0 for m = 1.
 double ddsInclusionProbability(int evaluation, int maxEvaluations);
 
-/// A standard normal deviate by the polar method, in which one more deviate chooses between the two it yields.
+/// A standard normal deviate by the polar method; one further uniform deviate chooses between the two that it yields.
 double ddsNormalDeviate(const DeviateSource& deviate);
 
 /// `value`, reflected at the bound that it violates; at that bound itself if the reflection violates the other one.
 double ddsReflect(double value, double lower, double upper);
 
-/// The best set with each parameter perturbed with the given probability, at least one of them; r is the
-/// perturbation's standard deviation as a fraction of the parameter's range.
+/// The best set with each parameter perturbed with the given probability, and at least one of them in any case; r is
+/// the standard deviation of the perturbation as a fraction of the range of the parameter.
 ParameterSet ddsCandidate(std::span<const double> best, const SearchBounds& bounds, double r,
                           double inclusionProbability, const DeviateSource& deviate);
 
-/// DDS as setups choose it.
+/// DDS as a setup selects it.
 class DdsMethod final : public SearchMethod {
  public:
   const SearchFacts& facts() const override;
   BoundSection section() override;
-  std::vector<SearchAdvice> advice(std::size_t n) const override;
   std::string_view budgetRefusal() const override;
   /// Random start points, unless it starts from the initial set.
   bool evaluatesSample(const InitialSampleSettings& sample) const override { return !sample.includeInitialParameters; }
-  /// It perturbs ever fewer parameters as its budget is used up, so that another budget is another search: that starts
-  /// from the best parameter set of the earlier one, whose evaluations are kept.
+  /// DDS perturbs ever fewer parameters as its budget is used up, so that another budget means another search. It
+  /// starts from the best parameter set of the earlier one, whose evaluations are kept.
   RaisedBudget raiseBudget(const SearchHistory& history, const StoppingCriteria& stopping,
                            const InitialSampleSettings& sample) const override;
-  /// The last of the searches that run() makes, with what its predecessors have left of the budget.
+  /// The search that follows the earlier ones, with the rest of the budget.
   std::unique_ptr<SearchAlgorithm> make(SearchProblem problem) const override;
   /// Runs the earlier searches with smaller budgets first, each from the best set of the one before.
   SearchSummary run(SearchProblem problem, const PeriodicStep& periodicStep) const override;

@@ -55,7 +55,7 @@ ParameterSet withinBounds(const std::vector<double>& unitPoint, const SearchBoun
   return set;
 }
 
-/// Splits rows into cells by the separator that the header row shows.
+/// Splits rows into cells at the separator found in the header row.
 class RowSplitter {
  public:
   explicit RowSplitter(std::string_view header) {
@@ -84,7 +84,7 @@ class RowSplitter {
   char separator_ = ' ';
 };
 
-/// The column of every parameter: entry c of the result is the parameter of column c.
+/// Entry c of the result is the index of the parameter in column c.
 std::vector<std::size_t> parametersOfColumns(const std::vector<std::string_view>& header, const std::string& place,
                                              const SearchSpace& space) {
   std::vector<std::size_t> parameters;
@@ -109,8 +109,8 @@ std::vector<std::size_t> parametersOfColumns(const std::vector<std::string_view>
   return parameters;
 }
 
-/// A model-scale value of parameter j on the search scale, or nothing when it lies outside the bounds. A value that
-/// rounding carried past a bound, as in a table printed by another program, is put on the bound.
+/// Transforms a model-scale value of parameter j to the search scale; empty if it is outside the bounds. A value that
+/// is past a bound by a rounding error only, as in a table printed by another program, is set to the bound.
 std::optional<double> toSearchScale(double value, std::size_t j, const SearchSpace& space) {
   const bool isInteger = space.transformation[j] == TransformationType::integer;
   const double lower = space.lower[j];
@@ -118,7 +118,7 @@ std::optional<double> toSearchScale(double value, std::size_t j, const SearchSpa
   bool failed = false;
   const double transformed =
       TransformParameterValue(value, lower, space.transformation[j], TransformDirection::forward, failed);
-  // The integer rule truncates towards zero, so that a value just below the lower bound would pass for the bound.
+  // The integer rule truncates towards zero, so that a value just below the lower bound would become the bound.
   const double compared = isInteger ? value : transformed;
   const double tolerance = 1.0e-12 * std::max({1.0, std::abs(lower), std::abs(upper)});
   if (failed || !(compared >= lower - tolerance)) return std::nullopt;
@@ -191,7 +191,7 @@ const SettingSection<InitialSampleSection>& initialSampleSection() {
 }
 
 SearchBounds searchBounds(const SearchSpace& space) {
-  // Ten times the tolerance by which the integer rule lifts a value onto the next integer.
+  // Ten times the tolerance within which the integer rule takes a value as the next integer.
   constexpr double kBelowNextInteger = 1.0e-7;
   SearchBounds bounds{space.lower, space.upper, space.initial, std::vector<bool>(space.size())};
   for (std::size_t j = 0; j < space.size(); ++j) {

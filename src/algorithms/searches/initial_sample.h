@@ -15,7 +15,7 @@
 
 namespace mirevo {
 
-/// How the points of an initial sample come about.
+/// How the points of an initial sample are generated.
 enum class SampleGeneration : std::int32_t {
   uniformRandom = 0,
   latinHypercube = 1,
@@ -27,10 +27,10 @@ enum class SampleGeneration : std::int32_t {
 struct InitialSampleSettings {
   bool includeInitialParameters = true;
   SampleGeneration generation = SampleGeneration::latinHypercube;
-  std::string fileName;  ///< absolute; of a sample from a file
+  std::string fileName;  ///< absolute; only for a sample from a file
 };
 
-/// The section INITIAL_SAMPLE, and the seed of the run that it shares with the uncertainty analysis.
+/// The section INITIAL_SAMPLE, and the seed of the run, which the uncertainty analysis sets, too.
 struct InitialSampleSection {
   InitialSampleSettings& sample;
   std::int32_t& randomSeed;
@@ -39,23 +39,24 @@ const SettingSection<InitialSampleSection>& initialSampleSection();
 /// The keyword of `fileName`.
 inline constexpr std::string_view kInitialSampleFileKeyword = "Initial_Sample_File_Name";
 
-/// The bounds that the searches keep to. The upper bound of an integer parameter is drawn in a little: a point that lay
-/// on it, or within the tolerance of the integer rule below it, would become an integer beyond the parameter's bound.
+/// The bounds that the searches keep to. The upper bound of an integer parameter is moved in a little: a point on it,
+/// or below it by less than the tolerance of the integer rule, would become an integer beyond the bound of the
+/// parameter.
 SearchBounds searchBounds(const SearchSpace& space);
 
-/// Draws `count` sets within the bounds; with `includeInitialParameters` the first is the initial set, and the others
-/// are the sample of count − 1. `givenSets` is what readInitialSample() returned, for a sample from a file; its first
-/// sets are used. Throws FatalError when it holds too few.
+/// Draws `count` sets within the bounds; with `includeInitialParameters` the first is the initial set, followed by a
+/// sample of count − 1. For a sample from a file `givenSets` is what readInitialSample() returned; its first sets are
+/// used. Throws FatalError when there are too few.
 std::vector<ParameterSet> drawInitialSample(const InitialSampleSettings& settings,
                                             std::span<const ParameterSet> givenSets, const SearchBounds& bounds,
                                             std::size_t count, UniformGenerator& random);
 
-/// Reads a sample: lines that are blank or start with `#` are skipped; a header row of the variable parameters' names
-/// in any order; then one set a row, on the model scale. Columns are separated by tabs, semicolons, commas or blanks,
-/// whichever of these stands first in that order in the header. Returns the sets on the search scale, in setup order.
-/// Throws FatalError ("Error: Initial sample file invalid") with file and line for names that are unknown, missing or
-/// repeated, values that are no numbers or outside their bounds, rows of another length than the header, and no row at
-/// all.
+/// Reads a sample: a header row with the names of the variable parameters in any order, then one set per row on the
+/// model scale; blank lines and lines that start with `#` are skipped. Columns are separated by tabs, semicolons,
+/// commas or blanks: the first of these, in this order, that the header contains. Returns the sets on the search scale,
+/// in setup order. Throws FatalError ("Error: Initial sample file invalid") with file and line for names that are
+/// unknown, missing or repeated, values that are not numbers or are outside their bounds, rows of a different length
+/// from the header, and a file without rows.
 std::vector<ParameterSet> readInitialSample(std::string_view fileName, std::string_view text, const SearchSpace& space);
 
 /// readInitialSample() of a file.

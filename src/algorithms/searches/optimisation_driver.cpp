@@ -47,7 +47,7 @@ SearchSummary runSearch(SearchAlgorithm& search, std::string_view algorithm, con
     return search.summary();
   } catch (const std::bad_alloc&) {
     failForMemory();
-  } catch (const std::length_error&) {  // a container asked for more than there can be
+  } catch (const std::length_error&) {  // a container exceeded its maximum size
     failForMemory();
   }
 }

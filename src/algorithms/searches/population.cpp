@@ -23,7 +23,7 @@ double populationSpread(const Population& population, int parameterCount) {
       sumOfSquares += x * x;
     }
     const double mean = sumOfValues / m;
-    // Rounding can leave a tiny negative variance where all points agree.
+    // Rounding can make the variance slightly negative where all points agree.
     sum += std::sqrt(std::max(0.0, sumOfSquares / m - mean * mean));
   }
   return sum / parameterCount;
@@ -58,8 +58,7 @@ double contractionFactor(std::size_t n) {
 }
 
 std::vector<double> centroid(const Population& population, std::span<const std::size_t> places) {
-  // Summed as differences from one member: where all members agree, as in a fixed parameter, their value comes out
-  // exactly.
+  // Summed as differences from one member, so that the centroid is exact where all members agree.
   const ParameterSet& origin = population[places.front()].set;
   const auto count = static_cast<double>(places.size());
   std::vector<double> result(origin.size());

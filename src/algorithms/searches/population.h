@@ -14,7 +14,7 @@ namespace mirevo {
 struct Individual {
   ParameterSet set;
   EvaluationResult result;
-  int failedMoves = 0;  ///< of PSE: moves of this point's step that have failed
+  int failedMoves = 0;  ///< PSE only: moves of the point's current step that have failed
 
   double value() const { return result.aggregate; }
 };
@@ -34,10 +34,10 @@ double normalisedPopulationRange(const Population& population, const SearchBound
 
 /// The smallest box that holds the members.
 Box boundingBox(const Population& population);
-/// The box of the members at `places` (at least one).
+/// The box of the members with the indices `places` (at least one).
 Box boundingBox(const Population& population, std::span<const std::size_t> places);
 
-/// The centroid of the members at `places` (at least one).
+/// The centroid of the members with the indices `places` (at least one).
 std::vector<double> centroid(const Population& population, std::span<const std::size_t> places);
 
 /// g + factor·(u − g): with factor −1 the reflection of u through g, with 1/2 the point half-way between them.

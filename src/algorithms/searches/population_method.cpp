@@ -18,7 +18,7 @@ RaisedBudget PopulationMethod::raiseBudget(const SearchHistory& history, const S
         history.budget, stopping.maxEvaluations, populationSize());
     return raised;
   }
-  // What lies beyond the earlier budget is the final model run of the search that used it up.
+  // An evaluation beyond the earlier budget is the final model run of the search that used the budget up.
   raised.keptEvaluations = history.budget;
   raised.note = fmt::format("Max_No_Evaluations was raised from {} to {}: the search goes on where it ended",
                             history.budget, stopping.maxEvaluations);

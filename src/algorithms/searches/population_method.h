@@ -4,13 +4,20 @@
 
 namespace mirevo {
 
+struct SimplexSettings {
+  std::int32_t pointCount = 2;
+};
+
 /// What the searches with a population have in common.
 class PopulationMethod : public SearchMethod {
  public:
   bool evaluatesSample(const InitialSampleSettings& sample) const final;
-  /// Continues behind a raised budget as if it had been so high from the start.
+  /// With a raised budget the search continues as if the budget had been that large from the start.
   RaisedBudget raiseBudget(const SearchHistory& history, const StoppingCriteria& stopping,
                            const InitialSampleSettings& sample) const final;
+
+  /// The subcomplex of SCE and the simplex of PSE are one setting.
+  SimplexSettings simplex;
 };
 
 }  // namespace mirevo

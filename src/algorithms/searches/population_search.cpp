@@ -53,7 +53,7 @@ SearchStatus PopulationSearch::advance() {
   return kSearchOk;
 }
 
-/// Brings the summary up to date with the sorted population.
+/// Updates the summary from the sorted population.
 void PopulationSearch::noteLoop() {
   summary_.populationSpread = populationSpread(population_, static_cast<int>(problem_.bounds.size()));
   summary_.populationRange = normalisedPopulationRange(population_, problem_.bounds);
@@ -130,7 +130,7 @@ ParameterSet PopulationSearch::drawFrom(const Box& box) {
 
 std::vector<std::size_t> PopulationSearch::drawSimplex(std::size_t count, std::size_t size, std::size_t ranked) {
   assert(count <= size && size <= ranked);
-  // Drawn members lose their weight. All sums are whole numbers and exact.
+  // Members that have been drawn get weight 0. All sums are of integers and therefore exact.
   std::vector<double> weights(size);
   for (std::size_t i = 0; i < size; ++i) weights[i] = static_cast<double>(ranked - i);
   double total = std::accumulate(weights.begin(), weights.end(), 0.0);

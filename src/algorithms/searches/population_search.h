@@ -35,19 +35,19 @@ class PopulationSearch : public SearchAlgorithm {
 
   virtual bool areSettingsValid() const = 0;
   virtual std::size_t populationSize() const = 0;
-  /// Makes one loop over `population_`, which is sorted best first before it and need not be after it.
+  /// Makes one loop over `population_`, which is sorted best first before the call and need not be afterwards.
   virtual void makeLoop() = 0;
 
-  /// Evaluates proposals in one batch. The results stand in the order of the proposals; nothing stands where a proposal
-  /// was not run as the budget is used up.
+  /// Evaluates proposals in one batch. The results are in the order of the proposals; empty for a proposal that was not
+  /// run because the budget is used up.
   std::vector<std::optional<EvaluationResult>> evaluate(std::span<const ParameterSet> proposals);
-  /// How many proposals the search should make for each one that it has evaluated: more than one where a surrogate
-  /// model chooses among them.
+  /// How many proposals the search should make for each one that is evaluated: more than one where a surrogate model
+  /// chooses among them.
   std::size_t proposalsPerRun() const;
-  /// Places of the `count` most promising proposals, in ascending order.
+  /// Indices of the `count` most promising proposals, in ascending order.
   std::vector<std::size_t> mostPromising(std::span<const ParameterSet> proposals, std::size_t count);
-  /// Where the surrogate model fitted around each of `centres` predicts least; nothing where it is not in use, or where
-  /// that has been run already.
+  /// The point where the surrogate model fitted around each of `centres` predicts the lowest value; left out where it
+  /// has been run already. Empty if no surrogate model is in use.
   std::vector<PredictedMinimum> predictedMinima(std::span<const Individual> centres);
   bool isBudgetUsedUp() const { return summary_.evaluationCount >= problem_.stopping.maxEvaluations; }
 
@@ -58,7 +58,7 @@ class PopulationSearch : public SearchAlgorithm {
   ParameterSet clampedToBounds(ParameterSet set) const;
   /// A uniformly random point of a box.
   ParameterSet drawFrom(const Box& box);
-  /// Places of `count` distinct members out of the best `size` of m = `ranked` that are sorted best first, drawn one
+  /// Indices of `count` distinct members among the best `size` of m = `ranked` members sorted best first, drawn one
   /// after the other, the i-th best with a probability proportional to m + 1 − i; returned in ascending order.
   std::vector<std::size_t> drawSimplex(std::size_t count, std::size_t size, std::size_t ranked);
 

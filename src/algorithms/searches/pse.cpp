@@ -12,21 +12,30 @@
 namespace mirevo {
 namespace {
 
-/// Standard deviation of a mutation, in those of the simplex. With 1 the test functions take up to a tenth more
+/// Standard deviation of a mutation relative to that of the simplex. With 1 the test functions take up to a tenth more
 /// evaluations; with 0.8 small populations collapse.
 constexpr double kMutationSpread = 0.9;
 
-/// Length of a reflection in those of SCE, whose complexes keep points apart that this population draws together. With
-/// 1 it comes to rest in curved valleys; with 1.2 it loses valleys in ten dimensions.
+/// Length of a reflection relative to that of SCE, whose complexes keep points apart, whereas this population
+/// contracts. With 1 it gets stuck in curved valleys; with 1.2 it misses optima in ten dimensions.
 constexpr double kReflectionLength = 1.1;
 
-/// With a surrogate model: of a generation one run in so many goes to its predicted minima.
+/// With a surrogate model, the number of points of the population for each predicted minimum that is run.
 constexpr std::size_t kPointsPerMinimum = 4;
 
 constexpr std::string_view kPopulationKeyword = "Population_Size";
 constexpr std::string_view kSimplexKeyword = "No_Points_Simplex";
 constexpr std::string_view kContractionKeyword = "Prob_Contraction";
 constexpr std::string_view kSimplexRefusal = "Error: No. of points in a simplex in PSE algorithm invalid";
+
+/// That a simplex has no more points than the population.
+std::optional<SettingRefusal> validatePseControl(const PseMethod& method) {
+  const std::int32_t points = method.settings.populationSize;
+  if (method.simplex.pointCount <= points) return std::nullopt;
+  return SettingRefusal{
+      std::string(kSimplexRefusal), kSimplexKeyword,
+      fmt::format("expected at most the {} points of the population, found {}", points, method.simplex.pointCount)};
+}
 
 std::optional<SettingRefusal> validateProbabilities(const PseSettings& settings) {
   if (settings.reflectionProbability + settings.contractionProbability <= 1.0) return std::nullopt;
@@ -61,9 +70,9 @@ void Pse::makeLoop() {
   replaceParents(offspring, proposals);
 }
 
-/// With a surrogate model, runs where it predicts least around each of the best points take the turns of offspring
-/// spread evenly over the generation: were they those of the worst points, these would hardly ever move. They replace
-/// the points around which they were predicted when better, so that the population stays spread.
+/// With a surrogate model, the minima that it predicts around each of the best points replace offspring at positions
+/// spread evenly over the generation: if they replaced those of the worst points, these would hardly ever move. A
+/// minimum replaces the point around which it was predicted if it is better, so that the population stays spread.
 void Pse::proposePredictedMinima(std::vector<Offspring>& offspring) {
   const std::size_t most = std::max(population_.size() / kPointsPerMinimum, std::size_t{1});
   std::vector<PredictedMinimum> minima = predictedMinima(std::span(population_).first(most));
@@ -72,11 +81,11 @@ void Pse::proposePredictedMinima(std::vector<Offspring>& offspring) {
   }
 }
 
-/// The parents of a generation, best first: what a budget cuts off are the offspring of the worst. The best points have
-/// too few better ones for a simplex that is worse than them alone, and their turns go to the worst.
+/// The parents of a generation, best first, so that a budget cuts off the offspring of the worst. The best points have
+/// too few points better than themselves for a simplex; the worst have a second offspring instead.
 std::vector<std::size_t> Pse::chooseParents() const {
   const std::size_t size = population_.size();
-  // Less than half, so that the best of the parents, whose simplex has no choice, has a single offspring.
+  // Less than half, so that the best of the parents, whose simplex has no choice, has only one offspring.
   const std::size_t unmoved = std::min(static_cast<std::size_t>(simplex_.pointCount) - 1, (size - 1) / 2);
   std::vector<std::size_t> parents;
   parents.reserve(size);
@@ -86,7 +95,8 @@ std::vector<std::size_t> Pse::chooseParents() const {
   return parents;
 }
 
-/// A point's own offspring compete, not those of the whole population: the promising ones of all lie close together.
+/// The choice is among the offspring of one point, not of the whole population, whose most promising offspring are
+/// close together.
 Pse::Offspring Pse::mostPromisingOffspring(std::size_t parent) {
   std::vector<Offspring> drawn;
   std::vector<ParameterSet> proposals;
@@ -104,7 +114,7 @@ void Pse::replaceParents(std::span<const Offspring> offspring, std::span<const P
     if (!results[i]) continue;
     const Offspring& child = offspring[i];
     Individual& parent = population_[child.parent];
-    // Neither the best point nor one that this generation has just found gives way to a worse one.
+    // Neither the best point nor one that this generation has just found is replaced by a worse one.
     const bool isTakenAnyway =
         child.isTakenAnyway && child.parent > 0 && !isReplaced[child.parent] && isUsable(*results[i]);
     if (isTakenAnyway || isBetter(results[i]->aggregate, parent.value())) {
@@ -116,7 +126,7 @@ void Pse::replaceParents(std::span<const Offspring> offspring, std::span<const P
   }
 }
 
-/// The other points of the simplex: better ones than the parent; any where a small population has too few.
+/// The other points of the simplex: points better than the parent, or any if a small population has too few.
 std::vector<std::size_t> Pse::drawOthers(std::size_t parent) {
   const auto count = static_cast<std::size_t>(simplex_.pointCount) - 1;
   const std::size_t size = population_.size();
@@ -147,8 +157,8 @@ ParameterSet Pse::reflection(std::size_t parent, std::span<const std::size_t> ot
   return isWithinBounds(point) ? point : mutation(parent, others, g);
 }
 
-/// Normally distributed about g in every parameter, with a standard deviation after that of the simplex about g. What
-/// would leave the bounds is drawn evenly from the range of the simplex.
+/// Normally distributed about g in every parameter, with a standard deviation proportional to that of the simplex about
+/// g. A value outside the bounds is instead drawn uniformly from the range of the simplex.
 ParameterSet Pse::mutation(std::size_t parent, std::span<const std::size_t> others, std::span<const double> g) {
   std::vector<std::size_t> simplex(others.begin(), others.end());
   simplex.push_back(parent);
@@ -174,7 +184,8 @@ const SearchFacts& PseMethod::facts() const {
                                       .longName = "Population Simplex Evolution",
                                       .runsInParallel = true,
                                       .usesSurrogate = true,
-                                      .drawsInitialSample = true};
+                                      .drawsInitialSample = true,
+                                      .needsRanges = true};
   return kFacts;
 }
 
@@ -211,14 +222,6 @@ BoundSection PseMethod::section() {
                                            "probability of an immediate mutation."}),
             [](const PseMethod& m) { return validateProbabilities(m.settings); })}}};
   return {section, *this};
-}
-
-std::optional<SettingRefusal> validatePseControl(const PseMethod& method) {
-  const std::int32_t points = method.settings.populationSize;
-  if (method.simplex.pointCount <= points) return std::nullopt;
-  return SettingRefusal{
-      std::string(kSimplexRefusal), kSimplexKeyword,
-      fmt::format("expected at most the {} points of the population, found {}", points, method.simplex.pointCount)};
 }
 
 std::vector<SearchAdvice> PseMethod::advice(std::size_t n) const {

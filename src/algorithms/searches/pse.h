@@ -12,7 +12,8 @@ namespace mirevo {
 struct PseSettings {
   std::int32_t populationSize = 50;
   double reflectionProbability = 0.7;   ///< of the move that is due, at first a reflection
-  double contractionProbability = 0.0;  ///< of a contraction at once; what is left to 1 is that of a mutation at once
+  double contractionProbability = 0.0;  ///< of an immediate contraction; the remainder to 1 is that of an immediate
+                                        ///< mutation
 };
 
 /// Population Simplex Evolution: the step of SCE made by all points of one population at once, a whole generation in
@@ -22,16 +23,16 @@ struct PseSettings {
 /// are; every other point u has an offspring, and the q − 1 worst have two. For each, q − 1 distinct points better than
 /// u are drawn, the i-th best of the population's N with a probability proportional to N + 1 − i, as SCE draws those of
 /// a simplex of which u is the worst. Let g be their centroid. The step of a point, spread over generations, is
-///   the reflection g − a·(u − g);
-///   when it has failed the contraction g + c·(u − g);
-///   when both have failed a mutation, taken even when worse: u has got stuck.
-/// A mutation that is due is made; else the move that is due with `reflectionProbability`, a contraction at once with
-/// `contractionProbability`, and a mutation at once with what is left to 1. It takes the place of u when better. A new
-/// point begins a step. A mutation is normally distributed about g, in every parameter on its own: that brings back the
-/// directions that the linear moves lose. It also stands in for a reflection outside the bounds. c is that of SCE,
-/// a is 1.1 times that of SCE. With a surrogate model the most promising of several offspring of a point is run; a
-/// quarter of the generation is run where the model predicts least around each of the best points. What the
-/// alternatives cost is measured in docs/algorithms/pse.md and docs/algorithms/surrogate.md.
+///   the reflection g − a·(u − g); when it has failed the contraction g + c·(u − g); when both have failed a mutation,
+///   accepted even if worse: u is stuck.
+/// A mutation that is due is made. Otherwise the reflection or contraction that is due is made with
+/// `reflectionProbability`, an immediate contraction with `contractionProbability`, and an immediate mutation with the
+/// remaining probability. The offspring replaces u if it is better. A new point begins a step. A mutation is normally
+/// distributed about g, independently in every parameter, which restores the directions that the linear moves lose. It
+/// also replaces a reflection outside the bounds. c is that of SCE, a is 1.1 times that of SCE. With a surrogate model
+/// the most promising of several offspring of a point is run, and a quarter of the generation goes to the points where
+/// the model predicts the lowest values around each of the best points. What the alternatives cost is measured in
+/// docs/algorithms/pse.md and docs/algorithms/surrogate.md.
 class Pse final : public PopulationSearch {
  public:
   Pse(const PseSettings& settings, const SimplexSettings& simplex, SearchProblem problem);
@@ -39,9 +40,9 @@ class Pse final : public PopulationSearch {
  private:
   struct Offspring {
     ParameterSet set;
-    std::size_t parent = 0;      ///< place of u in the population
-    int failedMoves = 0;         ///< of the parent's step once this offspring has failed
-    bool isTakenAnyway = false;  ///< even when worse than u
+    std::size_t parent = 0;      ///< index of u in the population
+    int failedMoves = 0;         ///< in the parent's step, if this offspring fails
+    bool isTakenAnyway = false;  ///< accepted even if worse than u
   };
 
   bool areSettingsValid() const override;
@@ -61,7 +62,7 @@ class Pse final : public PopulationSearch {
   SimplexSettings simplex_;
 };
 
-/// PSE as setups choose it.
+/// PSE as a setup selects it.
 class PseMethod final : public PopulationMethod {
  public:
   const SearchFacts& facts() const override;
@@ -69,14 +70,11 @@ class PseMethod final : public PopulationMethod {
   std::vector<SearchAdvice> advice(std::size_t n) const override;
   std::int64_t populationSize() const override { return settings.populationSize; }
   double evaluationsPerLoop() const override { return settings.populationSize; }
-  /// It asks the surrogate model once per generation, SCE at every step.
+  /// PSE asks the surrogate model once per generation, SCE at every step.
   double loopsBefore(double sets) const override;
   std::unique_ptr<SearchAlgorithm> make(SearchProblem problem) const override;
 
   PseSettings settings;
 };
-
-/// That a simplex has no more points than the population.
-std::optional<SettingRefusal> validatePseControl(const PseMethod& method);
 
 }  // namespace mirevo

@@ -14,6 +14,15 @@ constexpr std::string_view kPointsKeyword = "No_Points_Complex";
 constexpr std::string_view kSubcomplexKeyword = "No_Points_Subcomplex";
 constexpr std::string_view kSubcomplexRefusal = "Error: No. of points in a subcomplex in SCE algorithm invalid";
 
+/// That a subcomplex has no more points than its complex.
+std::optional<SettingRefusal> validateSceControl(const SceMethod& method) {
+  const std::int32_t points = method.settings.pointsPerComplex;
+  if (method.simplex.pointCount <= points) return std::nullopt;
+  return SettingRefusal{
+      std::string(kSubcomplexRefusal), kSubcomplexKeyword,
+      fmt::format("expected at most the {} points of a complex, found {}", points, method.simplex.pointCount)};
+}
+
 }  // namespace
 
 Sce::Sce(const SceSettings& settings, const SimplexSettings& simplex, SearchProblem problem)
@@ -68,7 +77,7 @@ Sce::Subcomplex Sce::drawSubcomplex(const Complex& complex) {
 }
 
 /// Draws the subcomplex of a step. A surrogate model chooses the most promising of the reflections and contractions of
-/// several subcomplexes; it comes first, and its counterpart second.
+/// several subcomplexes; it is tried first, and its counterpart second.
 void Sce::chooseSubcomplex(Complex& complex) {
   const std::size_t count = proposalsPerRun();
   std::vector<Subcomplex> drawn;
@@ -87,9 +96,9 @@ void Sce::chooseSubcomplex(Complex& complex) {
   complex.second = chosen % 2 == 0 ? contraction(complex) : std::move(proposals[chosen - 1]);
 }
 
-/// With a surrogate model the complex that holds the best point tries first where the model predicts least, and what it
-/// would have tried first comes second. A minimum better than the best point takes that one's place: it says much about
-/// the valley, and nothing about the rest of the complex, which a worst point less would draw together.
+/// With a surrogate model the complex that holds the best point first tries the predicted minimum, and then what it
+/// would have tried first. A minimum that is better than the best point replaces that one and not the worst: it tells
+/// much about the valley and nothing about the rest of the complex, which the loss of its worst point would contract.
 void Sce::proposePredictedMinimum(Complex& complex) {
   std::vector<PredictedMinimum> minima = predictedMinima(std::span(complex.points).first(1));
   if (minima.empty()) return;
@@ -142,8 +151,11 @@ ParameterSet Sce::mutation(const Complex& complex) {
 }
 
 const SearchFacts& SceMethod::facts() const {
-  static constexpr SearchFacts kFacts{
-      .name = {0, "SCE"}, .longName = "Shuffled Complex Evolution", .usesSurrogate = true, .drawsInitialSample = true};
+  static constexpr SearchFacts kFacts{.name = {0, "SCE"},
+                                      .longName = "Shuffled Complex Evolution",
+                                      .usesSurrogate = true,
+                                      .drawsInitialSample = true,
+                                      .needsRanges = true};
   return kFacts;
 }
 
@@ -175,14 +187,6 @@ BoundSection SceMethod::section() {
                             .refusal = "Error: No. of evaluation steps in SCE algorithm invalid",
                             .meaning = "Evolution steps of a complex between two shuffles; 2n + 1 is usual."})}}};
   return {section, *this};
-}
-
-std::optional<SettingRefusal> validateSceControl(const SceMethod& method) {
-  const std::int32_t points = method.settings.pointsPerComplex;
-  if (method.simplex.pointCount <= points) return std::nullopt;
-  return SettingRefusal{
-      std::string(kSubcomplexRefusal), kSubcomplexKeyword,
-      fmt::format("expected at most the {} points of a complex, found {}", points, method.simplex.pointCount)};
 }
 
 std::vector<SearchAdvice> SceMethod::advice(std::size_t n) const {

@@ -20,16 +20,16 @@ struct SceSettings {
 /// and so on. Every complex makes the same number of evolution steps on its own, then the complexes are shuffled
 /// together. A step draws q points, better points more often, and moves the worst of them, u, with the centroid g of
 /// the others:
-///   reflection g − a·(u − g), taken when better than u (outside the bounds a random point of the complex's box stands
-///   in for it); else contraction g + c·(u − g), taken when better than u; else a random point of the complex's box,
-///   always taken unless its evaluation failed.
-/// The paper has a = 1 and c = 1/2. Here a = 0.75 + 0.5/n (at most 1) and c = 0.45 − 0.1/n, which found the optima of
-/// the test functions as surely with about a seventh fewer evaluations (docs/algorithms/sce.md).
-/// With a surrogate model a complex looks at reflections and contractions of several subcomplexes, runs the most
-/// promising one first and its counterpart next, and of several random points runs the most promising. In every step
-/// the complex of the loop's best point begins where the model predicts least around the best point of that complex. As
-/// complexes are independent of each other between two shuffles they advance in step, and the batch of a step holds the
-/// current proposal of every complex. Points, values and random numbers do not depend on how the batch is run.
+///   reflection g − a·(u − g), accepted if better than u (outside the bounds, a random point of the box of the complex
+///   replaces it); else contraction g + c·(u − g), accepted if better than u; else a random point of the box of the
+///   complex, always accepted unless its evaluation failed.
+/// The paper has a = 1 and c = 1/2. Here a = 0.75 + 0.5/n (at most 1) and c = 0.45 − 0.1/n, which needs about a seventh
+/// fewer evaluations on the test functions (docs/algorithms/sce.md). With a surrogate model a complex looks at
+/// reflections and contractions of several subcomplexes, runs the most promising one first and its counterpart next,
+/// and of several random points runs the most promising. In every step the complex that holds the best point of the
+/// loop first proposes the point where the model predicts the lowest value around its own best point. Complexes are
+/// independent of each other between two shuffles and advance together: the batch of a step holds the current proposal
+/// of every complex. Points, values and random numbers do not depend on how the batch is run.
 class Sce final : public PopulationSearch {
  public:
   Sce(const SceSettings& settings, const SimplexSettings& simplex, SearchProblem problem);
@@ -37,7 +37,7 @@ class Sce final : public PopulationSearch {
  private:
   /// The worst point of q points drawn from a complex, and the centroid of the others.
   struct Subcomplex {
-    std::size_t worst = 0;         ///< place of u in the complex
+    std::size_t worst = 0;         ///< index of u in the complex
     std::vector<double> centroid;  ///< g
   };
   /// The points of one complex, best first, and the step that it is making.
@@ -46,7 +46,7 @@ class Sce final : public PopulationSearch {
     Subcomplex current;
     ParameterSet first;             ///< reflection, or contraction where a surrogate model prefers it
     ParameterSet second;            ///< the other of the two
-    bool isFirstPredicted = false;  ///< whether `first` is where a surrogate model predicts least
+    bool isFirstPredicted = false;  ///< whether `first` is the minimum predicted by a surrogate model
     bool isMoved = false;           ///< whether this step has replaced a point
   };
   /// A way to propose a point to replace u; the step tries them one after the other.
@@ -76,7 +76,7 @@ class Sce final : public PopulationSearch {
   std::vector<Complex> complexes_;
 };
 
-/// SCE as setups choose it.
+/// SCE as a setup selects it.
 class SceMethod final : public PopulationMethod {
  public:
   const SearchFacts& facts() const override;
@@ -88,8 +88,5 @@ class SceMethod final : public PopulationMethod {
 
   SceSettings settings;
 };
-
-/// That a subcomplex has no more points than its complex.
-std::optional<SettingRefusal> validateSceControl(const SceMethod& method);
 
 }  // namespace mirevo

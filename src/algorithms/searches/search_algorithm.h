@@ -25,7 +25,7 @@ struct SearchSummary {
   std::string terminationMessage;  ///< empty while it runs
 };
 
-/// A search in steps: the step modes -1 (initialise) and 0 (advance) of its caller.
+/// A search in steps: initialise() once, then advance() until isTerminated().
 class SearchAlgorithm {
  public:
   SearchAlgorithm() = default;

@@ -17,44 +17,40 @@
 
 namespace mirevo {
 
-/// Number of points in a simplex: SCE's subcomplex and PSE's simplex are one setting.
-struct SimplexSettings {
-  std::int32_t pointCount = 2;
-};
-
-/// What is always true of a search, whatever its settings.
+/// What is true of a search whatever its settings.
 struct SearchFacts {
-  CodeName name;                    ///< in setups; the name is also that of messages and reports: "SCE"
+  CodeName name;                    ///< in setups; the name is also used in messages and reports: "SCE"
   std::string_view longName;        ///< "Shuffled Complex Evolution"
   bool runsInParallel = false;      ///< its batches fill several slots
   bool usesSurrogate = false;       ///< a surrogate model can choose among its proposals
   bool drawsInitialSample = false;  ///< it begins with the sample that the section INITIAL_SAMPLE describes
+  bool needsRanges = false;         ///< it uses the range of each parameter, which must not be empty
 };
 
 /// A keyword whose value is small for the number of variable parameters: the search may end early.
 struct SearchAdvice {
   std::string_view keyword;
   std::int64_t found = 0;
-  std::int64_t advised = 0;  ///< at least so much
+  std::int64_t advised = 0;  ///< the least value advised
 };
 
 /// A search that was interrupted or ended, and is to be continued with a raised budget.
 struct SearchHistory {
   int budget = 0;                       ///< Max_No_Evaluations then
-  int evaluations = 0;                  ///< that stand without a gap from the first one on
-  std::vector<EarlierSearch> searches;  ///< those that it was a continuation of
+  int evaluations = 0;                  ///< completed without a gap from the first one on
+  std::vector<EarlierSearch> searches;  ///< the searches that it continued
 };
 
 /// What becomes of an earlier search when its budget is raised.
 struct RaisedBudget {
   std::string refusal;                                    ///< why it cannot be continued; empty when it can
   std::string note;                                       ///< what the log should say, one line; empty: nothing
-  int keptEvaluations = std::numeric_limits<int>::max();  ///< those with higher numbers are made again
-  std::optional<EarlierSearch> earlier;                   ///< the earlier search, where this one starts from its best
+  int keptEvaluations = std::numeric_limits<int>::max();  ///< evaluations with higher numbers are repeated
+  std::optional<EarlierSearch> earlier;                   ///< the earlier search, if this one starts from its best set
 };
 
-/// A search together with its settings: everything that a setup, a run, a restart or a report asks about it. One form
-/// per search, beside its algorithm; search_methods.h lists them.
+/// A search together with its settings: everything that a setup, a run, a restart or a report asks about it. One class
+/// per search, beside its algorithm; search_methods.cpp lists them.
 class SearchMethod {
  public:
   SearchMethod() = default;
@@ -67,17 +63,21 @@ class SearchMethod {
   /// Its section inside OPTIMISATION_ALGORITHM with its keywords, bound to this object's settings.
   virtual BoundSection section() = 0;
   /// Settings that are small for n variable parameters.
-  virtual std::vector<SearchAdvice> advice(std::size_t n) const = 0;
-  /// The fixed text for a budget below 1, where the search has its own.
+  virtual std::vector<SearchAdvice> advice(std::size_t n) const {
+    static_cast<void>(n);
+    return {};
+  }
+  /// The fixed text for a budget below 1, if the search has one of its own.
   virtual std::string_view budgetRefusal() const { return {}; }
-  /// Whether it evaluates a sample, from which a scale of the objective functions can be taken.
+  /// Whether it evaluates a sample from which the scale of the objective functions can be determined.
   virtual bool evaluatesSample(const InitialSampleSettings& sample) const = 0;
 
-  /// Points of its population; 0 where it has none.
+  /// Number of points of its population; 0 if it has none.
   virtual std::int64_t populationSize() const { return 0; }
   /// Least number of evaluations in a loop.
   virtual double evaluationsPerLoop() const { return 1.0; }
-  /// Loops after the initial sample before so many parameter sets are evaluated that a surrogate model can be asked.
+  /// Number of loops after the initial sample until `sets` parameter sets are evaluated, before a surrogate model is
+  /// asked.
   virtual double loopsBefore(double sets) const {
     static_cast<void>(sets);
     return 0.0;
@@ -90,12 +90,9 @@ class SearchMethod {
   virtual std::unique_ptr<SearchAlgorithm> make(SearchProblem problem) const = 0;
   /// Makes the search and runs it from its start to its end. Throws what runSearch() throws.
   virtual SearchSummary run(SearchProblem problem, const PeriodicStep& periodicStep) const;
-
-  /// Points of a simplex: SCE's subcomplex and PSE's simplex are one setting.
-  SimplexSettings simplex;
 };
 
-/// Evaluations that the sample and so many loops after it make, at the least.
+/// The least number of evaluations that the sample and `loops` loops after it make.
 double evaluationsAfter(const SearchMethod& method, double loops);
 
 }  // namespace mirevo

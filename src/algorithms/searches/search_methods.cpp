@@ -1,46 +1,24 @@
 #include "algorithms/searches/search_methods.h"
 
-#include <array>
-
 #include "algorithms/searches/dds.h"
 #include "algorithms/searches/pse.h"
 #include "algorithms/searches/sce.h"
 
 namespace mirevo {
-namespace {
 
-template <class Method>
-std::unique_ptr<SearchMethod> makeOne() {
-  return std::make_unique<Method>();
+const ChoiceTable<SearchMethod>& searchMethods() {
+  /// A new search is added here.
+  static const auto searches = ChoiceTable<SearchMethod>::of<SceMethod, PseMethod, DdsMethod>();
+  return searches;
 }
 
-/// Every search: a new one is one more line here.
-constexpr std::array kSearches = {makeOne<SceMethod>, makeOne<PseMethod>, makeOne<DdsMethod>};
-
-}  // namespace
-
-std::vector<std::unique_ptr<SearchMethod>> searchMethods() {
-  std::vector<std::unique_ptr<SearchMethod>> methods;
-  methods.reserve(kSearches.size());
-  for (const auto& make : kSearches) methods.push_back(make());
-  return methods;
-}
-
-std::span<const CodeName> searchNames() {
-  static const auto names = [] {
-    std::array<CodeName, kSearches.size()> all;
-    for (std::size_t i = 0; i < all.size(); ++i) all[i] = kSearches[i]()->facts().name;
-    return all;
-  }();
-  return names;
-}
-
-std::unique_ptr<SearchMethod> makeSearchMethod(const SetupValue& value) {
-  for (const auto& make : kSearches) {
-    auto method = make();
-    if (isCode(method->facts().name, value)) return method;
+std::string searchesWith(bool SearchFacts::*fact, std::string_view between) {
+  std::string names;
+  for (const auto& search : searchMethods().all()) {
+    if (!(search->facts().*fact)) continue;
+    names.append(names.empty() ? "" : between).append(search->facts().name.name);
   }
-  return nullptr;
+  return names;
 }
 
 }  // namespace mirevo

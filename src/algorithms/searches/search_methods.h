@@ -1,18 +1,17 @@
 #pragma once
 
-#include <memory>
-#include <span>
-#include <vector>
+#include <string>
+#include <string_view>
 
 #include "algorithms/searches/search_method.h"
+#include "common/settings/choice_table.h"
 
 namespace mirevo {
 
-/// The names of all searches, those with a number first.
-std::span<const CodeName> searchNames();
-/// The search of that number or name, with the default settings; nullptr when there is none.
-std::unique_ptr<SearchMethod> makeSearchMethod(const SetupValue& value);
-/// Every search once, for the manual.
-std::vector<std::unique_ptr<SearchMethod>> searchMethods();
+/// All searches.
+const ChoiceTable<SearchMethod>& searchMethods();
+
+/// The names of the searches for which `fact` is true, separated by `between`: "SCE or PSE" for " or ".
+std::string searchesWith(bool SearchFacts::*fact, std::string_view between);
 
 }  // namespace mirevo

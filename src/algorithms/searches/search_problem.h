@@ -14,7 +14,7 @@ namespace mirevo {
 
 class ProposalSelector;
 
-/// A search with a smaller budget from whose best parameter set a search with a raised one continues.
+/// A search with a smaller budget, from whose best parameter set a search with a raised budget continues.
 struct EarlierSearch {
   std::int32_t maxEvaluations = 0;  ///< its budget, counted from the first evaluation of the run
   std::int32_t lastEvaluation = 0;  ///< the number of its last evaluation
@@ -29,7 +29,7 @@ struct SearchProblem {
   Evaluator& evaluator;
   UniformGenerator& random;
   ProposalSelector* selector = nullptr;             ///< of a surrogate-assisted search
-  std::vector<EarlierSearch> earlierSearches = {};  ///< that this one continues, in their order
+  std::vector<EarlierSearch> earlierSearches = {};  ///< the searches that this one continues, in order
 };
 
 }  // namespace mirevo

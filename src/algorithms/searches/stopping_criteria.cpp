@@ -40,8 +40,8 @@ void StoppingTests::update(double bestValue, int evaluationCount, double populat
   if (history_.size() > length) history_.pop_back();
   if (history_.size() == length) {
     const double earlier = history_.back();
-    // Deliberately without an absolute value in the denominator: values of opposite sign give a negative change, and
-    // the search counts as converged.
+    // Deliberately without an absolute value in the denominator: negative values give a negative change, with which the
+    // search counts as converged.
     relativeChange_ = 2.0 * std::abs(earlier - bestValue) / (bestValue + earlier);
   }
 

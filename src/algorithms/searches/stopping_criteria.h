@@ -12,7 +12,8 @@ namespace mirevo {
 struct StoppingCriteria {
   std::int32_t maxEvaluations = 1000;
   std::int32_t loopsConvergence = 10;  ///< loops over which the best objective value is compared
-  double minChange = 0.001;            ///< relative change of the best objective value below which it has converged
+  double minChange = 0.001;            ///< relative change of the best objective value below which the search has
+                                       ///< converged
 };
 
 /// The keyword of `maxEvaluations`.
@@ -23,8 +24,8 @@ const SettingSection<StoppingCriteria>& stoppingSection();
 /// The normalised population range below which a population has converged. Fixed, not a setting.
 inline constexpr double kConvergedPopulationRange = 1.0e-5;
 
-/// The three tests that end a population search, made after every loop. All are made every time; of those that hold the
-/// last one gives the message.
+/// The three tests that end a population search, all made after every loop. If several are met, the last gives the
+/// message.
 class StoppingTests final {
  public:
   explicit StoppingTests(const StoppingCriteria& criteria);
@@ -36,8 +37,8 @@ class StoppingTests final {
   bool isMet() const { return !message_.empty(); }
   /// Why the search stops; empty while it goes on.
   std::string_view message() const { return message_; }
-  /// 2·|H − f| / (f + H) of the best value f and the one `loopsConvergence` − 1 loops earlier, H. Until there is such a
-  /// loop it is twice the smallest change asked for, so that the search cannot count as converged.
+  /// 2·|H − f| / (f + H), where f is the best value and H the best value `loopsConvergence` − 1 loops earlier. Until
+  /// there is such a loop it is twice `minChange`, so that the search cannot count as converged.
   double relativeChange() const { return relativeChange_; }
 
  private:

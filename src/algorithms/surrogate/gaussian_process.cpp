@@ -10,12 +10,13 @@
 namespace mirevo {
 namespace {
 
-// Bounds of the hyperparameters: lengths relative to the unit cube of the parameters, noise to the signal's variance.
+// Bounds of the hyperparameters: lengths relative to the unit cube of the parameters, noise relative to the variance of
+// the signal.
 const double kShortest = std::log(1.0e-4);
 const double kLongest = std::log(1.0e2);
 const double kLeastNoise = std::log(1.0e-8);
 const double kMostNoise = std::log(1.0e-1);
-/// Of the search for the hyperparameters, in their logarithms and in −2·log likelihood.
+/// For the search for the hyperparameters: moves in their logarithms, gain in −2·log likelihood.
 constexpr QuasiNewtonSettings kSearch{1.5, 0.1, 20};
 
 }  // namespace
@@ -56,7 +57,7 @@ double GaussianProcess::deviance(const std::vector<double>& parameters) {
   const int order = static_cast<int>(m);
   if (!choleskyFactor(matrix_.data(), order)) return std::numeric_limits<double>::infinity();
 
-  std::vector<double> ones(m, 1.0);  // becomes K⁻¹·1
+  std::vector<double> ones(m, 1.0);  // becomes K⁻¹ times a vector of ones
   choleskySolve(matrix_.data(), order, ones.data());
   double sumOfOnes = 0.0;
   double sumOfValues = 0.0;
@@ -79,9 +80,10 @@ double GaussianProcess::deviance(const std::vector<double>& parameters) {
   return static_cast<double>(m) * std::log(variance_) + logDeterminant;
 }
 
-/// Leaves the inverse in the factor's place and the derivative's factors in the kernels'; the next deviance() makes
+/// Overwrites the factor with the inverse, and the kernels with factors of the derivative; the next deviance() computes
 /// both again. With G = K⁻¹ − w·wᵀ/s² and w = K⁻¹(y − mean) the derivative is the sum of the products of the entries of
-/// G and of those of K's derivative (Rasmussen and Williams 2006, equation 5.9); mean and s² are at their own maximum.
+/// G and of those of K's derivative (Rasmussen and Williams 2006, equation 5.9); mean and s² are at their
+/// maximum-likelihood values and contribute nothing.
 std::vector<double> GaussianProcess::devianceSlope() {
   const std::size_t m = points_.size();
   const std::size_t n = lengths_.size();
@@ -92,7 +94,7 @@ std::vector<double> GaussianProcess::devianceSlope() {
   for (std::size_t column = 0; column < m; ++column) {
     result[n] += noise_ * (matrix_[column * m + column] - weights_[column] * weights_[column] / variance_);
     for (std::size_t row = column + 1; row < m; ++row, ++pair) {
-      // Both triangles.
+      // The factor 2 accounts for both triangles.
       kernels_[pair] *= 2.0 * (matrix_[column * m + row] - weights_[column] * weights_[row] / variance_);
     }
   }
@@ -105,8 +107,8 @@ std::vector<double> GaussianProcess::devianceSlope() {
   return result;
 }
 
-/// Starts from where the last fit ended, or from equal lengths, relative to the spread of each coordinate, that are
-/// more likely: a search that has run off, to where the likelihood is flat, must not hold for all that follow.
+/// Starts from the last fit or, if they are more likely, from lengths that are equal relative to the spread of each
+/// coordinate: a search that has strayed to where the likelihood is flat must not affect all later ones.
 void GaussianProcess::startSearch(std::span<const double> spread) {
   const std::size_t n = spread.size();
   if (parameters_.size() != n + 1) parameters_.clear();
@@ -122,8 +124,7 @@ void GaussianProcess::startSearch(std::span<const double> spread) {
       parameters_ = trial;
     }
   }
-  // The likelihood says nothing about the length of a coordinate that does not vary: predictions shall not depend on
-  // it.
+  // The likelihood says nothing about the length of a coordinate that does not vary: predictions must not depend on it.
   for (std::size_t j = 0; j < n; ++j) {
     if (!(spread[j] > 0.0)) parameters_[j] = kLongest;
   }

@@ -13,7 +13,7 @@ constexpr int kMostRounds = 200;
 
 using Function = std::function<double(const std::vector<double>&)>;
 
-/// Moves `point`, of value `value`, along every coordinate in turn where that is better; returns the value reached.
+/// Moves `point`, whose value is `value`, along every coordinate in turn if that is better; returns the value reached.
 double explore(const Function& function, std::vector<double>& point, double value, double step, const Box& box,
                const std::vector<double>& leastMoves) {
   for (std::size_t j = 0; j < point.size(); ++j) {
@@ -32,7 +32,7 @@ double explore(const Function& function, std::vector<double>& point, double valu
   return value;
 }
 
-/// As far beyond `to` as it lies from `from`.
+/// The point as far beyond `to` as `from` is before it, clamped to the box.
 std::vector<double> beyond(const std::vector<double>& from, const std::vector<double>& to, const Box& box) {
   std::vector<double> point(to.size());
   for (std::size_t j = 0; j < point.size(); ++j) {

@@ -7,10 +7,10 @@
 
 namespace mirevo {
 
-/// Pattern search after Hooke and Jeeves (1961), doi:10.1145/321062.321069: a place in `box`, near a minimum of
-/// `function` and never worse than `start`. Steps are a quarter of the box at first and a ten-thousandth at last, but
-/// in coordinate j never below `leastMoves[j]`. The number of calls is limited, the result the same on every call; a
-/// value that is not a number is worse than every other.
+/// Pattern search after Hooke and Jeeves (1961), doi:10.1145/321062.321069: a point in `box` near a minimum of
+/// `function` and never worse than `start`. Steps shrink from a quarter of the box to a ten-thousandth, but in
+/// coordinate j never below `leastMoves[j]`. The number of calls is limited, and the result is deterministic; a value
+/// that is not a number is worse than every other.
 std::vector<double> patternSearch(const std::function<double(const std::vector<double>&)>& function,
                                   std::vector<double> start, const Box& box, const std::vector<double>& leastMoves);
 

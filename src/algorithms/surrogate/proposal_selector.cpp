@@ -16,14 +16,14 @@
 namespace mirevo {
 namespace {
 
-/// Of the width of a neighbourhood: places no farther apart in any coordinate are the same, and a second run tells
-/// nothing.
+/// As a fraction of the width of a neighbourhood: points that are closer in every coordinate count as the same, since a
+/// second run would tell nothing.
 constexpr double kSamePlace = 1.0e-3;
 
-/// Of a Gaussian process: the time for a fit grows with the third power of the neighbourhood.
+/// For a Gaussian process: the time for a fit grows with the third power of the size of the neighbourhood.
 constexpr std::size_t kMostNeighbours = 100;
 
-/// Stands for a prediction where a run is likely to fail: better only than that of a run made again.
+/// Replaces the prediction where a run is likely to fail: better only than kMadeAgain, for a run that would repeat one.
 constexpr double kLikelyToFail = std::numeric_limits<double>::max();
 constexpr double kMadeAgain = std::numeric_limits<double>::infinity();
 
@@ -44,15 +44,30 @@ std::unique_ptr<SurrogateModel> makeModel(SurrogateModelType type) {
   return std::make_unique<QuadraticSurrogate>();
 }
 
+/// That a neighbourhood that is given suffices for a polynomial.
+std::optional<SettingRefusal> validateNeighbourhood(const SurrogateSettings& settings, std::size_t n) {
+  const std::int32_t size = settings.neighbourhoodSize;
+  const std::size_t coefficients = quadraticCoefficientCount(n);
+  if (size == 0 || settings.modelType != SurrogateModelType::quadraticPolynomial ||
+      static_cast<std::size_t>(size) >= coefficients) {
+    return std::nullopt;
+  }
+  return SettingRefusal{
+      std::string(kNeighbourhoodRefusal), kNeighbourhoodKeyword,
+      fmt::format("expected at least the {} coefficients of a quadratic polynomial in {} parameters, or 0, found {}",
+                  coefficients, n, size)};
+}
+
 }  // namespace
 
-const SettingSection<SurrogateSettings>& surrogateSection() {
-  using Settings = SurrogateSettings;
-  static const SettingSection<SurrogateSettings> section{
+const SettingSection<SurrogateSection>& surrogateSection() {
+  using Section = SurrogateSection;
+  static const SettingSection<Section> section{
       {"OPTIMISATION_ALGORITHM/SURROGATE_MODEL_PARAMETERS",
        "when `Use_Surrogate_Model` is 1",
-       "The surrogate model that SCE and PSE may use to save model runs. May be empty.",
-       {setting<&Settings::samplingRate>(
+       "The surrogate model with which a search may save model runs. May be empty.",
+       {setting<Section>(
+            [](auto& s) -> auto& { return s.surrogate.samplingRate; },
             {.name = "Sampling_rate",
              .defaultValue = "25",
              .range = between(1, 100),
@@ -60,17 +75,22 @@ const SettingSection<SurrogateSettings>& surrogateSection() {
              .unit = "per cent",
              .meaning = "Share of the proposals that the model evaluates: those that the surrogate predicts best.",
              .checkOrder = 2}),
-        setting<&Settings::neighbourhoodSize>(
-            {.name = kNeighbourhoodKeyword,
-             .defaultValue = "0",
-             .range = from(0),
-             .refusal = kNeighbourhoodRefusal,
-             .unit = "evaluated sets",
-             .meaning = "Nearest evaluated sets to which the surrogate is fitted; model type 0 needs (n+1)(n+2)/2 of "
-                        "them for n variable parameters. 0: one and a half times as many for model type 0, three times "
-                        "as many, but at most 100, for model type 1.",
-             .checkOrder = 1}),
-        setting<&Settings::modelType>(
+        checked<Section>(
+            setting<Section>(
+                [](auto& s) -> auto& { return s.surrogate.neighbourhoodSize; },
+                {.name = kNeighbourhoodKeyword,
+                 .defaultValue = "0",
+                 .range = from(0),
+                 .refusal = kNeighbourhoodRefusal,
+                 .unit = "evaluated sets",
+                 .meaning =
+                     "Nearest evaluated sets to which the surrogate is fitted; model type 0 needs (n+1)(n+2)/2 of "
+                     "them for n variable parameters. 0: one and a half times as many for model type 0, three times "
+                     "as many, but at most 100, for model type 1.",
+                 .checkOrder = 1}),
+            [](const Section& s) { return validateNeighbourhood(s.surrogate, s.variableCount); }),
+        setting<Section>(
+            [](auto& s) -> auto& { return s.surrogate.modelType; },
             {.name = "Model_Type",
              .defaultValue = "1",
              .range = between(0, 1),
@@ -79,7 +99,8 @@ const SettingSection<SurrogateSettings>& surrogateSection() {
              .meaning =
                  "Kind of surrogate: a full quadratic polynomial, or a Gaussian process, which takes fewer model "
                  "runs and milliseconds of computation for each."}),
-        setting<&Settings::initialGenerations>(
+        setting<Section>(
+            [](auto& s) -> auto& { return s.surrogate.initialGenerations; },
             {.name = kGenerationsKeyword,
              .defaultValue = "1",
              .range = from(1),
@@ -91,23 +112,14 @@ const SettingSection<SurrogateSettings>& surrogateSection() {
   return section;
 }
 
-std::optional<SettingRefusal> validateSurrogateControl(const SurrogateSettings& settings, std::size_t n,
-                                                       std::optional<double> available) {
+std::optional<SettingRefusal> validateSurrogateControl(const SurrogateSettings& settings, double available) {
   const std::int32_t size = settings.neighbourhoodSize;
-  const std::size_t coefficients = quadraticCoefficientCount(n);
-  if (size > 0 && settings.modelType == SurrogateModelType::quadraticPolynomial &&
-      static_cast<std::size_t>(size) < coefficients) {
-    return SettingRefusal{
-        std::string(kNeighbourhoodRefusal), kNeighbourhoodKeyword,
-        fmt::format("expected at least the {} coefficients of a quadratic polynomial in {} parameters, or 0, found {}",
-                    coefficients, n, size)};
-  }
-  if (!available || *available >= size) return std::nullopt;
+  if (available >= size) return std::nullopt;
   return SettingRefusal{
       "Error: Population size and/or initial No. of generations too small for surrogate modelling optimisation",
       kGenerationsKeyword,
       fmt::format("expected at least Neighbourhood_Size = {} evaluated sets before the surrogate is fitted, found {}",
-                  size, *available)};
+                  size, available)};
 }
 
 std::string_view surrogateModelName(const SurrogateSettings& settings) {
@@ -122,7 +134,7 @@ std::size_t neighbourhoodSize(const SurrogateSettings& settings, std::size_t n) 
 }
 
 std::size_t leastSetCount(const SurrogateSettings& settings, std::size_t n) {
-  // Fewer than a plane needs say nothing about the shape of the objective.
+  // Fewer points than determine a plane tell nothing about the shape of the objective.
   return settings.modelType == SurrogateModelType::quadraticPolynomial ? quadraticCoefficientCount(n) : n + 2;
 }
 

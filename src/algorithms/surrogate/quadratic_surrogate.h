@@ -8,7 +8,7 @@
 
 namespace mirevo {
 
-/// Coefficients of a full quadratic polynomial in n parameters.
+/// Number of coefficients of a full quadratic polynomial in n parameters.
 constexpr std::size_t quadraticCoefficientCount(std::size_t n) {
   return (n + 1) * (n + 2) / 2;
 }
@@ -24,7 +24,7 @@ class QuadraticSurrogate final : public SurrogateModel {
   std::vector<double> terms(std::span<const double> point) const;
 
   std::vector<double> centre_;        ///< n; mean of the points
-  std::vector<double> width_;         ///< n; largest distance from it, 0 for a coordinate that does not vary
+  std::vector<double> width_;         ///< n; largest distance from the mean, 0 for a coordinate that does not vary
   std::vector<double> coefficients_;  ///< of 1, x_j, x_j·x_k (j <= k) in the scaled coordinates
 };
 

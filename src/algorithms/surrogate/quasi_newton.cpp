@@ -24,7 +24,7 @@ double product(const Vector& a, const Vector& b) {
   return std::inner_product(a.begin(), a.end(), b.begin(), 0.0);
 }
 
-/// The search at one point: where it is, and what it has learnt of the function's curvature.
+/// The state of a search: its point, and its approximation of the function's curvature.
 class QuasiNewton final {
  public:
   QuasiNewton(const SmoothFunction& function, Vector start, const Box& bounds, const QuasiNewtonSettings& settings)
@@ -54,7 +54,8 @@ class QuasiNewton final {
     return (point_[k] <= bounds_.lower[k] && slope_[k] > 0.0) || (point_[k] >= bounds_.upper[k] && slope_[k] < 0.0);
   }
 
-  /// Of the quadratic model's minimum in the coordinates that are free; straight down where nothing is known of it.
+  /// The direction to the minimum of the quadratic model in the free coordinates; steepest descent while there is no
+  /// model.
   Vector descent() const {
     const std::size_t n = point_.size();
     Vector direction(n, 0.0);
@@ -68,7 +69,7 @@ class QuasiNewton final {
     return direction;
   }
 
-  /// Takes the longest of a few steps that leads lower; false where none does.
+  /// Takes the longest of a few steps that decreases the function; false if none does.
   bool moveAlong(const Vector& direction) {
     double largest = 0.0;
     for (const double d : direction) largest = std::max(largest, std::abs(d));
@@ -91,7 +92,7 @@ class QuasiNewton final {
     return false;
   }
 
-  /// From a move `s` by which the slope changed by `y`.
+  /// BFGS update from a move `s` over which the slope changed by `y`.
   void learn(const Vector& s, const Vector& y) {
     const double bend = product(s, y);
     if (!(bend > 1.0e-10 * product(y, y))) return;
@@ -118,8 +119,8 @@ class QuasiNewton final {
   Vector point_;
   double value_ = std::numeric_limits<double>::infinity();
   Vector slope_;
-  Vector curvature_;     ///< n·n, the approximate inverse of the second derivatives; empty where nothing is known
-  bool isAway_ = false;  ///< whether the last value was asked for elsewhere
+  Vector curvature_;     ///< n·n, the approximate inverse of the second derivatives; empty while nothing is known
+  bool isAway_ = false;  ///< whether the function was last evaluated at another point
 };
 
 }  // namespace

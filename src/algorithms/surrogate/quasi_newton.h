@@ -7,10 +7,10 @@
 
 namespace mirevo {
 
-/// A function of n coordinates to be minimised, which may be infinite, and its derivatives.
+/// A function of n coordinates to be minimised, whose value may be infinite, and its derivatives.
 struct SmoothFunction {
   std::function<double(const std::vector<double>&)> value;
-  /// At the point of the last call of value(), which was finite there.
+  /// The derivatives at the point of the last call of value(), which must have been finite.
   std::function<std::vector<double>()> slope;
 };
 
@@ -26,8 +26,8 @@ struct LowPoint {
 };
 
 /// The best point that the quasi-Newton method of Broyden, Fletcher, Goldfarb and Shanno (Nocedal and Wright 2006,
-/// Numerical Optimization, chapter 6) reaches from `start` within the bounds, whose value() is the last one asked for.
-/// A coordinate on a bound that wants beyond it stays there for a move.
+/// Numerical Optimization, chapter 6) reaches from `start` within the bounds; value() is called last at this point. A
+/// coordinate at a bound whose step would leave the bounds is held there for that move.
 LowPoint quasiNewtonSearch(const SmoothFunction& function, std::vector<double> start, const Box& bounds,
                            const QuasiNewtonSettings& settings);
 

@@ -13,8 +13,8 @@ class SurrogateModel {
   SurrogateModel& operator=(const SurrogateModel&) = delete;
   virtual ~SurrogateModel() = default;
 
-  /// Fits to points of n coordinates each, of order 1, and their finite values, one a point. False when nothing can be
-  /// fitted; predict() must not be called then.
+  /// Fits to points of n coordinates each, of order 1, and their finite values, one per point. False when nothing can
+  /// be fitted; predict() must not be called then.
   virtual bool fit(std::span<const std::vector<double>> points, std::span<const double> values) = 0;
   virtual double predict(std::span<const double> point) const = 0;
 };

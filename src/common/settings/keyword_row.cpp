@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <utility>
 
 #include <fmt/format.h>
 
@@ -29,7 +30,7 @@ KeywordRow itemCount() {
 }
 
 KeywordRow unused(KeywordFacts facts, KeywordType type) {
-  return {facts, type};
+  return {std::move(facts), type};
 }
 
 bool isCode(const CodeName& meant, const SetupValue& value) {

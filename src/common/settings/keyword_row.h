@@ -26,16 +26,16 @@ enum class KeywordType {
   integer,
   real,
   code,       ///< one of a few values, by its number or by its name between quotes
-  name,       ///< text of at most kFieldWidth bytes, neither blank nor with tabs
+  name,       ///< text of at most kFieldWidth bytes that is not blank and has no tabs
   text,       ///< text of at most kFieldWidth bytes
   freeText,   ///< text of any length
-  textLines,  ///< a keyword that may be repeated, one text each
+  textLines,  ///< a keyword that may be repeated, with one text each time
   fileName,   ///< text of at most kFieldWidth bytes, made absolute; blank stays blank
   realList,
   date
 };
 
-/// A value as the setup has it. That of a coded keyword is its number, or its name where it has none.
+/// A value as read from the setup. That of a coded keyword is its number, or its name if it has no number.
 using SetupValue = std::variant<std::int32_t, double, std::string, std::vector<double>, DateRecord>;
 
 /// Valid numbers of a keyword. NaN and infinity are never valid.
@@ -45,7 +45,7 @@ struct ValueRange {
   bool lowestExcluded = false;
 
   bool contains(double value) const;
-  /// "1 or more", "greater than 0", "0 to 3"; empty when everything is valid.
+  /// "1 or more", "greater than 0", "0 to 3"; empty when every number is valid.
   std::string text() const;
 };
 
@@ -60,41 +60,45 @@ constexpr ValueRange between(double lowest, double highest) {
   return {.lowest = lowest, .highest = highest};
 }
 
-/// Default of an optional keyword without a value of its own.
+/// The default of an optional keyword that has no default value.
 inline constexpr std::string_view kNoDefault = "none";
 
-/// Names of settings that are a yes or a no.
+/// KeywordFacts::bearsOnResults of settings that do not affect the results.
+inline constexpr bool kNotOfResults = false;
+
+/// The codes of settings that mean no or yes.
 inline constexpr CodeName kNoYesNames[] = {{0, "no"}, {1, "yes"}};
 
-/// Why a value cannot stay, though the keyword's range holds it.
+/// Why a value within the keyword's range is refused.
 struct SettingRefusal {
   std::string message;       ///< the fixed text
-  std::string_view keyword;  ///< whose value it is
+  std::string_view keyword;  ///< the keyword whose value is refused
   std::string explanation;   ///< what was expected and found
 };
 
 /// What a row says about its keyword, apart from the field that takes the value.
 struct KeywordFacts {
   std::string_view name;
-  std::optional<KeywordType> type = {};  ///< that of the field, unless given
-  std::string_view defaultValue = {};    ///< as a setup would have it; empty where the keyword is required
+  std::optional<KeywordType> type = {};  ///< the type of the field, unless given
+  std::string_view defaultValue = {};    ///< as written in a setup; empty if the keyword is required
   ValueRange range = {};
   std::span<const CodeName> codes = {};  ///< of a coded keyword
-  /// Fixed text for a value outside the range; a blank at its end stands before the name of the item.
+  /// Fixed text for a value outside the range; if it ends with a blank, the name of the item follows.
   std::string_view refusal = {};
   std::string_view unit = {};
-  std::string_view meaning = {};
-  bool bearsOnResults = true;  ///< another value may give other results: no run is continued with it
-  int checkOrder = 0;          ///< values are checked in this order, those of the same order as they are read
+  std::string meaning = {};
+  bool bearsOnResults = true;  ///< another value may change the results: a restart with one is refused
+  int checkOrder = 0;          ///< values are checked in ascending order of this number, equal ones in reading order
 };
 
-/// One keyword of a section: all that reading it, echoing it, checking it and the manual need to know.
+/// One keyword of a section: all that is needed to read, check, echo and document it.
 struct KeywordRow {
   KeywordFacts facts;
   KeywordType type = KeywordType::integer;
-  /// Puts the value into its field of the section's settings. Null for list counts and for what is known and not used.
+  /// Puts the value into its field of the section's settings. Null for list counts and for keywords that are known but
+  /// not used.
   void (*store)(void* settings, const SetupValue& value) = nullptr;
-  /// What relates the value to those read with it; called when its own range holds it.
+  /// Checks the value against the others of its section; called if it is within its own range.
   std::optional<SettingRefusal> (*check)(const void* settings) = nullptr;
 
   std::string_view name() const { return facts.name; }
@@ -104,12 +108,12 @@ struct KeywordRow {
 
 /// One section of the setup file.
 struct SectionRow {
-  /// Names of the sections below the target, `/` between them; an item section's number is written `n`.
+  /// Names of the sections below the target, separated by `/`; the number of an item section is written `n`.
   std::string_view path;
-  std::string_view readWhen;  ///< "always", or when
+  std::string_view readWhen;  ///< "always", or a condition
   std::string_view meaning;
   std::vector<KeywordRow> keywords = {};
-  /// The name of the item that the settings are of, for refusals; null: the section's own name.
+  /// The name of the item that the settings belong to, for refusals; null: the section's own name.
   std::string (*itemName)(const void* settings) = nullptr;
 };
 
@@ -149,7 +153,7 @@ void assign(Field& field, const SetupValue& value) {
   if constexpr (std::is_enum_v<Field>) {
     field = static_cast<Field>(std::get<std::int32_t>(value));
   } else if constexpr (std::is_same_v<Field, bool>) {
-    field = (std::get<std::int32_t>(value) & 1) != 0;  // the lowest bit: -1 is a yes, too
+    field = (std::get<std::int32_t>(value) & 1) != 0;  // the lowest bit: -1 means yes, too
   } else if constexpr (std::is_same_v<Field, std::optional<double>>) {
     field = std::get<double>(value);
   } else if constexpr (std::is_same_v<Field, std::vector<std::string>>) {
@@ -161,14 +165,14 @@ void assign(Field& field, const SetupValue& value) {
 
 }  // namespace settings_detail
 
-/// A row whose value goes into the field that `fieldOf(settings)` names; `fieldOf` is a lambda without captures.
+/// A row whose value goes into the field that `fieldOf(settings)` returns; `fieldOf` is a lambda without captures.
 template <class Settings, class FieldOf>
 KeywordRow setting(FieldOf, KeywordFacts facts) {
   using Field = std::remove_reference_t<decltype(std::declval<FieldOf>()(std::declval<Settings&>()))>;
   const KeywordType type = facts.type.value_or(
       std::is_same_v<Field, bool> || !facts.codes.empty() ? KeywordType::code : settings_detail::typeOf<Field>());
   if (std::is_same_v<Field, bool> && facts.codes.empty()) facts.codes = kNoYesNames;
-  return {facts, type, [](void* settings, const SetupValue& value) {
+  return {std::move(facts), type, [](void* settings, const SetupValue& value) {
             settings_detail::assign(FieldOf{}(*static_cast<Settings*>(settings)), value);
           }};
 }
@@ -177,22 +181,22 @@ KeywordRow setting(FieldOf, KeywordFacts facts) {
 template <auto Member, class Settings, class Field>
 KeywordRow memberSetting(Field Settings::*, KeywordFacts facts) {
   return setting<Settings>(
-      [](Settings & settings) -> auto& { return settings.*Member; }, facts);
+      [](Settings & settings) -> auto& { return settings.*Member; }, std::move(facts));
 }
 template <auto Member>
 KeywordRow setting(KeywordFacts facts) {
-  return memberSetting<Member>(Member, facts);
+  return memberSetting<Member>(Member, std::move(facts));
 }
 
-/// A coded row whose value is handed on as it was read, a number or a name: `take(settings, value)`.
+/// A coded row whose value is passed on as it was read, a number or a name: `take(settings, value)`.
 template <class Settings, class Take>
 KeywordRow choice(Take, KeywordFacts facts) {
-  return {facts, KeywordType::code,
+  return {std::move(facts), KeywordType::code,
           [](void* settings, const SetupValue& value) { Take{}(*static_cast<Settings*>(settings), value); }};
 }
 
-/// The row with a check of what relates its value to others; `check(settings)` is a function or lambda without captures
-/// that gives the refusal, or nothing.
+/// The row with a check of its value against others; `check(settings)` is a function or lambda without captures that
+/// returns the refusal, if any.
 template <class Settings, class Check>
 KeywordRow checked(KeywordRow row, Check) {
   row.check = [](const void* settings) -> std::optional<SettingRefusal> {
@@ -201,12 +205,17 @@ KeywordRow checked(KeywordRow row, Check) {
   return row;
 }
 
-/// The row of a list's count.
+/// A SectionRow::itemName that returns `nameOf(settings)`; `nameOf` is a lambda without captures.
+template <class Settings, class NameOf>
+auto itemName(NameOf) {
+  return [](const void* settings) -> std::string { return NameOf{}(*static_cast<const Settings*>(settings)); };
+}
+
 KeywordRow itemCount();
-/// A row of a keyword that is known and not used.
+/// A row for a keyword that is known but not used.
 KeywordRow unused(KeywordFacts facts, KeywordType type);
 
-/// The name of a coded value, empty for one that has none.
+/// The name of a coded value; empty if it has none.
 std::string_view nameOfCode(std::span<const CodeName> codes, const SetupValue& value);
 
 /// Whether a coded value, a number or a name as SetupValue has it, is the one meant here.

@@ -10,7 +10,7 @@
 namespace mirevo {
 namespace {
 
-/// Longest time between two looks at the cancellation; a message ends the wait.
+/// Longest time between two checks for cancellation; a message ends the wait.
 constexpr double kMasterPollSeconds = 0.5;
 
 void sendToWorkers(Job& job, RankMessage tag, const std::string& content) {
@@ -85,7 +85,7 @@ void RankEvaluator::takeResult(int rank, ResultMessage message) {
     fatalError(kCommunicationFailed, fmt::format("the worker with rank {} sent a result that nobody asked for", rank));
   }
   EvaluationResult& result = message.result;
-  // Only here is the transformation known that was settled by the initial sample.
+  // Only the master knows the transformation determined from the initial sample.
   if (result.ok()) result.aggregate = runner_.aggregator().aggregate(result.objectiveValues);
   if (ledger_.isFolderWanted(result)) {
     job_.send(rank, static_cast<int>(RankMessage::keepFolder), encode(KeepFolderMessage{ledger_.numberOf(*place)}));

@@ -14,26 +14,26 @@
 
 namespace mirevo {
 
-/// The master of a job with workers: hands one set at a time to whichever worker is free, the one of lowest rank first.
+/// The master of a job with workers: hands one set at a time to each free worker, the lowest rank first.
 class RankEvaluator final : public Evaluator {
  public:
-  /// `runner` has no slots here; it knows which sets cannot be run. The workers have been told to begin.
-  /// `earlier`: evaluations that are not to be made again; may be null. All must outlive this.
+  /// `runner` has no slots here; it tells which sets cannot be run. beginWorkers() must have been called. `earlier`:
+  /// evaluations that are not repeated; may be null. All must outlive the object.
   RankEvaluator(ModelRunner& runner, Job& job, EvaluationObserver& observer, FailedRunPolicy& failedRuns,
                 EarlierEvaluations* earlier = nullptr);
 
-  /// Throws FatalError with the worker's own message when one of them has met a fatal error.
+  /// Also throws FatalError, with the worker's own message, after a fatal error on a worker.
   std::vector<EvaluationResult> evaluateParameterSets(std::span<const ParameterSet> sets, DispatchMode mode) override;
   void settleAggregates(std::span<EvaluationResult> sample) override;
 
  private:
   struct Worker {
-    std::optional<ReadyMessage> place;  ///< nothing while it is not ready
-    std::optional<std::size_t> set;     ///< that it runs, by its place in the batch
+    std::optional<ReadyMessage> place;  ///< host and process folder; empty until it is ready
+    std::optional<std::size_t> set;     ///< index in the batch of the set that it runs
   };
 
   void startOnFreeWorkers();
-  /// Sends the next set; sets that cannot be run get their result at once and the one after is taken.
+  /// Sends the next set; sets that cannot be run get their result at once and are skipped.
   void startNext(int rank);
   void handle(const Message& message);
   void takeResult(int rank, ResultMessage message);
@@ -45,15 +45,15 @@ class RankEvaluator final : public Evaluator {
   Job& job_;
   EvaluationObserver& observer_;
   EvaluationLedger ledger_;
-  std::vector<Worker> workers_;  ///< of rank 1, 2, ...
+  std::vector<Worker> workers_;  ///< of ranks 1, 2, ...
 };
 
-/// Tells every worker, in rank order, to begin with the setup. A job of one process has none.
+/// Sends `message` to every worker, in rank order. A job of one process has none.
 void beginWorkers(Job& job, const BeginMessage& message);
 
 /// Tells every worker, in rank order, to stop, and waits for their farewells. False when one has not answered within
-/// `seconds`. A worker may meet a fatal error after the last result was in, its base folder still being copied; `warn`
-/// is given a text for each. What else they still have to say is dropped.
+/// `seconds`. A worker may fail after the last result, while it still copies the base folder; `warn` is called for each
+/// such failure. Other messages are dropped.
 bool stopWorkers(Job& job, double seconds, const std::function<void(const std::string&)>& warn);
 
 }  // namespace mirevo

@@ -40,7 +40,7 @@ template <>
 struct Layout<FailureMessage> {
   static void of(auto& archive, auto& message) { archive(message.message, message.detail); }
 };
-/// Without the number, which the master knows.
+/// Without the evaluation number, which the master knows.
 template <>
 struct Layout<EvaluationResult> {
   static void of(auto& archive, auto& result) {
@@ -64,7 +64,7 @@ struct Layout<UnusedObservations> {
 template <class Value>
 constexpr bool kIsPlain = std::is_arithmetic_v<Value> || std::is_enum_v<Value>;
 
-/// Turns a message into bytes, field by field in the order in which they are given.
+/// Turns a message into bytes, field by field.
 class Writer final {
  public:
   template <class... Fields>
@@ -104,7 +104,7 @@ class Writer final {
   std::string content_;
 };
 
-/// Fills a message with what a Writer made of it.
+/// Restores a message from the bytes of a Writer.
 class Reader final {
  public:
   explicit Reader(std::string_view content) : rest_(content) {}

@@ -22,13 +22,13 @@ namespace mirevo {
 /// A worker that meets a fatal error sends `failure` at any time and waits for `stop`.
 enum class RankMessage : int { begin = 1, set, stop, ready, result, failure, farewell, keepFolder };
 
-/// The master's setup file as it read it, so that all ranks work from the same text.
+/// The setup file as the master read it, so that all ranks use the same text.
 struct BeginMessage {
   std::string setupFile;  ///< absolute path
   std::string text;
 };
 
-/// Where a worker is.
+/// Where a worker runs.
 struct ReadyMessage {
   std::string host;
   std::string processFolder;
@@ -36,18 +36,18 @@ struct ReadyMessage {
 
 /// A set to be run.
 struct SetMessage {
-  int number = 0;  ///< in the run, from 1
+  int number = 0;  ///< number of the evaluation in the run, from 1
   ParameterSet set;
 };
 
 struct ResultMessage {
   EvaluationResult result;
-  std::string leftBehind;  ///< what the launcher has to say about processes that had to be ended, or empty
+  std::string leftBehind;  ///< what the launcher says of processes that had to be ended, or empty
 };
 
-/// The worker's last run is one whose folder is to be kept.
+/// Tells a worker to keep the folder of its last run.
 struct KeepFolderMessage {
-  int number = 0;  ///< of its evaluation
+  int number = 0;  ///< of the evaluation
 };
 
 struct FailureMessage {
@@ -55,7 +55,7 @@ struct FailureMessage {
   std::string detail;
 };
 
-// Numbers cross as their own bytes, so that a result is the same bits as a local one. Each decode function throws
+// Numbers are sent as their bytes, so that a result has the same bits as a local one. Each decode function throws
 // FatalError for content that its encode function cannot have made.
 
 std::string encode(const BeginMessage& message);

@@ -12,9 +12,9 @@ namespace {
 
 constexpr int kMaster = 0;
 constexpr int kSlot = 1;
-/// A wait without a model has no reason to end early; the job's own naps grow no further anyway.
+/// Without a model run there is no reason to end a wait early.
 constexpr double kIdleSeconds = 3600.0;
-/// Longest time between two looks for the stop message while the model runs; a model that ends ends the wait.
+/// Longest time between two checks for the stop message while the model runs; the end of the model ends the wait.
 constexpr double kBusyPollSeconds = 0.1;
 
 void sendToMaster(Job& job, RankMessage tag, std::string content) {
@@ -39,7 +39,7 @@ bool isExecuting(ModelRunner& runner) {
   return executing != 0;
 }
 
-/// Runs the model with one set; nothing when the master says stop meanwhile.
+/// Runs the model with one set; empty when the master sends stop in the meantime.
 std::optional<ResultMessage> runModel(Job& job, ModelRunner& runner, const SetMessage& message) {
   if (auto failure = runner.prepareModelRun(message.set, kSlot))
     return ResultMessage{runner.failedResult(*failure), {}};
@@ -60,7 +60,7 @@ std::optional<ResultMessage> runModel(Job& job, ModelRunner& runner, const SetMe
 
 void runWorkerLoop(Job& job, ModelRunner& runner) {
   sendToMaster(job, RankMessage::ready, encode(ReadyMessage{hostName(), runner.launcher().getProcessFolder(kSlot)}));
-  std::vector<std::string> warnings;  // of what was done since the last result, told with the next one
+  std::vector<std::string> warnings;  // on folders kept since the last result; sent with the next one
   while (true) {
     const Message message = await(job);
     if (message.tag == static_cast<int>(RankMessage::stop)) return;

@@ -8,17 +8,17 @@
 
 namespace mirevo {
 
-/// The loop of a worker: runs each set that the master sends, in slot 1, and sends back its result, until the
-/// master says stop; a model that still runs is then ended. Throws FatalError as ModelRunner does.
+/// The loop of a worker: runs each set that the master sends, in slot 1, and sends back its result, until the master
+/// sends stop; a model that is still running is then ended. Throws FatalError as ModelRunner does.
 void runWorkerLoop(Job& job, ModelRunner& runner);
 
-/// Waits for the master to say begin; nothing when it says stop instead.
+/// Waits for the master's begin message; empty when stop comes instead.
 std::optional<BeginMessage> awaitBegin(Job& job);
 
-/// Tells the master of a fatal error and waits for its stop.
+/// Reports a fatal error to the master and waits for its stop message.
 void reportFailure(Job& job, const FailureMessage& failure);
 
-/// The worker's last message: it has nothing running any more.
+/// Sends the worker's last message: nothing of it is running any more.
 void sayFarewell(Job& job);
 
 }  // namespace mirevo

@@ -22,7 +22,7 @@ struct EquationFunction {
 /// All functions of the equation language. Angles are in radians; `log` is the natural logarithm.
 std::span<const EquationFunction> equationFunctions();
 
-/// The function of that name, letters compared without case; null when there is none.
+/// The function with this name, in any letter case; null when there is none.
 const EquationFunction* findEquationFunction(std::string_view name);
 
 /// The functions' names, for suggestions.

@@ -22,10 +22,10 @@ bool isNamePart(char c) {
   return isNameStart(c) || isDigit(c) || c == '.';
 }
 
-/// Longest text that the parser library takes.
+/// Longest text that the parser library accepts.
 constexpr std::size_t kMaximumTranslation = 5000;
 
-/// Walks over an equation once, keeping what is open and whether an operand or an operator must follow.
+/// Walks over an equation once, keeping track of open brackets and of whether an operand or an operator must follow.
 class Translator final {
  public:
   Translator(std::string_view equation, const EquationNames& names) : equation_(equation), names_(names) {}
@@ -51,7 +51,7 @@ class Translator final {
   }
 
  private:
-  /// An open bracket; the first one stands for the equation itself.
+  /// An open bracket; the first one represents the equation itself.
   struct Bracket {
     std::size_t position = 0;
     const EquationFunction* function = nullptr;
@@ -71,7 +71,7 @@ class Translator final {
   }
   void emit(std::string_view text) { result_.text += text; }
 
-  /// What stands here, for a message.
+  /// The text at the current position, for a message.
   std::string found() const {
     if (atEnd()) return "the end of the equation";
     const auto byte = static_cast<unsigned char>(here());
@@ -99,8 +99,8 @@ class Translator final {
     }
   }
 
-  /// The library takes one sign before an operand, so that a row of them is reduced to one of five: two minus signs
-  /// cancel, a minus sign within a negation changes nothing, and of negations there are one or two.
+  /// The library accepts one sign before an operand, so a sequence of signs is reduced to one of five cases: two minus
+  /// signs cancel, a minus sign after a negation changes nothing, and of negations one or two remain.
   void takeSign() {
     if (here() == '-' && negations_ == 0) minus_ = !minus_;
     if (here() == '!') negations_ = negations_ == 1 ? 2 : 1;
@@ -163,7 +163,7 @@ class Translator final {
     skipBlanks();
     const bool called = !atEnd() && here() == '(';
     if (called) {
-      // Only a function can stand before a bracket, so that a parameter called "max" does not hide max().
+      // Only a function can precede a bracket, so a parameter called "max" does not hide max().
       if (const EquationFunction* function = findEquationFunction(name)) return openBracket(function);
       if (names_.find(name) < 0) failUnknown(start, name, "function", equationFunctionNames());
     }
@@ -197,7 +197,8 @@ class Translator final {
     }
   }
 
-  /// pi and e, unless a parameter differs from them in case alone: "E" meant as a parameter "e" must not become 2.718.
+  /// pi and e, unless a parameter's name differs from the constant only in case: "e" meant as the parameter "E" must
+  /// not become 2.718.
   std::optional<double> findConstant(std::string_view name) const {
     std::optional<double> constant;
     if (name == "pi") constant = std::numbers::pi;
@@ -317,7 +318,7 @@ class Translator final {
   bool operandExpected_ = true;
   bool minus_ = false;  ///< signs before the next operand: a minus sign, then negations
   int negations_ = 0;
-  int conditionals_ = 0;  ///< so far: each may stand within the one before
+  int conditionals_ = 0;  ///< so far: each may be nested in the one before
   std::vector<Bracket> open_;
   TranslatedEquation result_;
 };

@@ -12,7 +12,7 @@ namespace mirevo {
 
 /// Longest equation, in bytes.
 inline constexpr std::size_t kMaximumEquationLength = 10000;
-/// Most brackets that may be open within each other, and most conditionals of an equation.
+/// The largest number of nested brackets, and of conditionals in an equation.
 inline constexpr int kMaximumEquationNesting = 100;
 
 /// What is wrong with an equation. `position` is a 0-based byte offset.
@@ -22,12 +22,12 @@ struct EquationError {
   std::string remedy;  ///< empty when there is nothing to advise
 };
 
-/// An equation in terms that the parser library takes whatever the parameters are called: variable i is `v<i>`, the
-/// k-th number is `c<k>`, functions have their names.
+/// An equation in a form that the parser library accepts whatever the names of the parameters: variable i is `v<i>`,
+/// the k-th number is `c<k>`, functions keep their names.
 struct TranslatedEquation {
   std::string text;
   std::vector<double> numbers;
-  std::vector<std::size_t> variables;  ///< those that occur, ascending, each once
+  std::vector<std::size_t> variables;  ///< indices of those that occur, ascending, each once
 };
 
 /// The variables of equations, by name.

@@ -16,7 +16,7 @@ namespace mirevo {
 namespace {
 
 constexpr std::size_t kMaximumNameLength = 255;
-/// Longest equation that is shown with a mark below the place of an error.
+/// Longest equation that is shown with a mark below the position of an error.
 constexpr std::size_t kMaximumShownEquation = 160;
 
 /// Characters of UTF-8 text.
@@ -64,14 +64,14 @@ mu::Parser createParser() {
   } catch (const mu::ParserError& error) {
     fatalError("Error: Unable to create set of predefined functions for equation parser", error.GetMsg());
   }
-  // The optimizer reassociates products with constants; equations are computed as they are written.
+  // The optimizer reassociates products with constants; equations must be computed as they are written.
   parser->EnableOptimizer(false);
   return *parser;
 }
 
 class MuParserExpression final : public CompiledExpression {
  public:
-  /// `prototype` knows the functions; `values` is bound by address. Throws mu::ParserError.
+  /// `prototype` has the functions; `values` are bound by address. Throws mu::ParserError.
   MuParserExpression(const mu::Parser& prototype, TranslatedEquation equation, std::span<double> values)
       : parser_(prototype), variables_(std::move(equation.variables)) {
     for (const std::size_t variable : variables_) {

@@ -17,7 +17,7 @@ class CompiledExpression {
   CompiledExpression& operator=(const CompiledExpression&) = delete;
   virtual ~CompiledExpression() = default;
 
-  /// The value with the variables as they are now; nothing when it cannot be computed. NaN and infinity are values.
+  /// The value for the current values of the variables; empty when it cannot be computed. NaN and infinity are values.
   virtual std::optional<double> evaluate() const = 0;
   /// The 0-based indices of the variables that occur, ascending, each once.
   virtual const std::vector<std::size_t>& variables() const = 0;
@@ -44,8 +44,8 @@ class ExpressionEvaluator final {
   /// to evaluate the expression ...".
   double EvaluateExpression(std::string_view equation) const;
 
-  /// Whether the variable of that name occurs in the equation, as a name and not as part of another. Throws FatalError
-  /// with "Error: In the check of ..." for a name that is no variable, and as `compile` does.
+  /// Whether the variable with this name occurs in the equation, as a name of its own and not as part of another.
+  /// Throws FatalError with "Error: In the check of ..." for a name that is not a variable, and like compile().
   bool NameAppearsIn(std::string_view equation, std::string_view name) const;
 
  private:
@@ -53,7 +53,7 @@ class ExpressionEvaluator final {
   std::unique_ptr<Implementation> implementation_;
 };
 
-/// Ends the run: the expression was compiled but has no value.
+/// Throws FatalError: the expression was compiled but has no value.
 [[noreturn]] void failEvaluation(std::string_view equation);
 
 }  // namespace mirevo

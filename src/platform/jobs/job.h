@@ -10,11 +10,11 @@ namespace mirevo {
 /// A message between two processes of one job.
 struct Message {
   int rank = 0;         ///< the sender's
-  int tag = 0;          ///< what it is; its meaning is the users' of the job
+  int tag = 0;          ///< kind of the message, as defined by the user of the job
   std::string content;  ///< bytes
 };
 
-/// The message of a fatal error of a job's communication, whose detail says more.
+/// The message of a FatalError about a job's communication; the detail says more.
 constexpr const char* kCommunicationFailed = "Error: MPI communication failed";
 
 /// The job that this process is part of: the processes that a job launcher started together for one run, and messages
@@ -26,13 +26,13 @@ class Job {
   Job& operator=(const Job&) = delete;
   virtual ~Job() = default;
 
-  /// By what its processes reach each other, as the user knows it; empty in a job of one process.
+  /// The name of the means of communication for messages to the user, "MPI"; empty in a job of one process.
   virtual std::string_view means() const = 0;
 
   /// This process's number: 0 the master, above 0 a worker; -1 in a job of one process.
   virtual int rank() const = 0;
 
-  /// Number of processes in the job; their ranks count from 0.
+  /// Number of processes in the job; ranks count from 0.
   virtual int processCount() const = 0;
   bool hasWorkers() const { return processCount() > 1; }
 
@@ -40,21 +40,21 @@ class Job {
   /// FatalError when the job's communication is broken.
   virtual void send(int rank, int tag, std::string content) = 0;
 
-  /// The next message from anyone; nothing when none has come within `seconds` (0: does not wait). Sleeps while it
+  /// The next message from any process; empty when none has come within `seconds` (0: does not wait). Sleeps while it
   /// waits. Throws FatalError when the job's communication is broken.
   virtual std::optional<Message> receive(double seconds) = 0;
 
-  /// Leaves the job, after which this process is one of its own; every process of the job must do so. Throws FatalError
-  /// when what was sent last is not taken within `seconds`.
+  /// Leaves the job; every process of the job must do so. Throws FatalError when the messages sent last are not
+  /// received within `seconds`.
   virtual void finalise(double seconds) = 0;
 
-  /// Ends every process of the job at once: the way out when one of them does not answer. Does not return.
+  /// Ends every process of the job at once, for when one of them does not answer. Does not return.
   virtual void abort(int exitCode) = 0;
 };
 
-/// Joins the job that a launcher has started; where there is none, this process is a job of its own. Throws FatalError
-/// when a launcher started several processes that cannot be brought together: they would all do the same run. Call it
-/// before signal handlers are installed, as what brings them together may install some of its own.
+/// Joins the job that a launcher has started; without one this process is a job of its own. Throws FatalError when a
+/// launcher has started several processes that cannot be connected, as all of them would make the same run. To be
+/// called before signal handlers are installed, as MPI may install some of its own.
 std::unique_ptr<Job> joinJob();
 
 }  // namespace mirevo

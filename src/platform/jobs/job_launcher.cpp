@@ -13,11 +13,11 @@
 namespace mirevo {
 namespace {
 
-/// By which launchers tell a process its number and the number of processes: OpenMPI's mpirun; the process management
-/// interface of other launchers and of Slurm in its old form and in its new one, which has no variable for the size.
+/// Variables by which launchers tell a process its rank and the number of processes: OpenMPI's mpirun, and the process
+/// management interface of other launchers and of Slurm, old (PMI) and new (PMIX, which has no variable for the size).
 constexpr std::array<const char*, 3> kRankVariables = {"OMPI_COMM_WORLD_RANK", "PMIX_RANK", "PMI_RANK"};
 constexpr std::array<const char*, 2> kSizeVariables = {"OMPI_COMM_WORLD_SIZE", "PMI_SIZE"};
-/// Whatever a launcher or MPI itself puts into the environment of a process of the job.
+/// Prefixes of the variables that a launcher or MPI sets in a process of the job.
 constexpr std::array<std::string_view, 6> kJobPrefixes = {"OMPI_", "PMIX_", "PMI_", "ORTE_", "OPAL_", "PRTE_"};
 
 template <class Names>

@@ -4,13 +4,13 @@
 
 namespace mirevo {
 
-/// This process's number as the job launcher gave it to its environment; -1 without a launcher.
+/// The rank of this process, from the environment that the job launcher set; -1 without a launcher.
 int launcherRank();
 
-/// How many processes the launcher started, as it says itself; nothing where it does not.
+/// How many processes the launcher has started; empty if it does not say.
 std::optional<int> launchedProcessCount();
 
-/// Removes what a launcher has put into the environment: a model that uses MPI itself would take itself for a process
+/// Removes the launcher's variables from the environment: a model that uses MPI itself would take itself for a process
 /// of this job.
 void hideJobFromModels();
 

@@ -6,6 +6,7 @@
 #include <ctime>
 #include <list>
 #include <optional>
+#include <string>
 #include <string_view>
 #include <unistd.h>
 #include <utility>
@@ -21,13 +22,13 @@
 namespace mirevo {
 namespace {
 
-// MPI's own waits spin. A wait here is a probe and a nap, and naps grow with the time since the last message: an answer
-// that comes at once is taken at once, one that takes 50 ms or longer is taken a hundredth of that late on the average,
-// and a process that waits for long uses a few thousandths of a core.
+// MPI's own waits spin. A wait here is a probe and a nap, and naps grow with the time since the last message: an
+// immediate answer is received at once, one that takes 50 ms or longer is received later by a hundredth of that time on
+// average, and a process that waits long uses a few thousandths of a core.
 constexpr double kShortestNap = 50e-6;
 constexpr double kLongestNap = 5e-3;
 constexpr double kSteepness = 1.0 / 16.0;  ///< of the nap's growth with the time waited, up to kPlateau
-constexpr double kPlateau = 1e-3;          ///< of 16 ms to 200 ms waiting
+constexpr double kPlateau = 1e-3;          ///< of the nap, from 16 ms to 200 ms of waiting
 constexpr double kLateSteepness = 1.0 / 200.0;
 
 double napLength(double waited) {
@@ -56,7 +57,7 @@ void check(int code, std::string_view call) {
   fatalError(kCommunicationFailed, fmt::format("{}: {}", call, errorText(code)));
 }
 
-/// What is on its way, in a list, as MPI reads the content and writes the request where they lie.
+/// Messages on their way. A list, since MPI refers to contents and requests by address.
 struct Traffic {
   struct Send {
     std::string content;
@@ -65,7 +66,7 @@ struct Traffic {
   std::list<Send> running;
   double lastMessage = runTimeClock();  ///< sent or received
 
-  /// Forgets what has arrived.
+  /// Removes messages that have arrived.
   void complete() {
     for (auto send = running.begin(); send != running.end();) {
       int done = 0;
@@ -131,7 +132,7 @@ std::optional<Message> MpiJob::receive(double seconds) {
 }
 
 void MpiJob::finalise(double seconds) {
-  if (!hasWorkers()) return;  // for the second time
+  if (!hasWorkers()) return;  // has been called before
   const double start = runTimeClock();
   for (traffic_.complete(); !traffic_.running.empty(); traffic_.complete()) {
     const double waited = secondsSince(start);
@@ -154,13 +155,14 @@ void MpiJob::abort(int exitCode) {
 
 std::unique_ptr<Job> joinMpiJob() {
   const auto launched = launchedProcessCount();
-  const bool isLaunched = launched || launcherRank() >= 0;
-  if (!isLaunched) return nullptr;  // variables that the user has set for a model's own MPI stay
+  const int launcherRankAtStart = launcherRank();
+  const bool isLaunched = launched || launcherRankAtStart >= 0;
+  if (!isLaunched) return nullptr;  // variables that the user has set for a model's own MPI are kept
   if (launched && *launched <= 1) {
     hideJobFromModels();
     return nullptr;
   }
-  // Finalising waits in MPI itself; several processes may share a core.
+  // MPI_Finalize spins; several processes may share a core.
   ::setenv("OMPI_MCA_mpi_yield_when_idle", "1", 0);
   int code = MPI_Init(nullptr, nullptr);
   int count = 1;
@@ -173,11 +175,12 @@ std::unique_ptr<Job> joinMpiJob() {
   hideJobFromModels();
   if (code == MPI_SUCCESS && count > 1) return std::make_unique<MpiJob>(rank, count);
   if (code == MPI_SUCCESS) MPI_Finalize();
-  if (!launched) return nullptr;
-  fatalError("Error: The processes of the job cannot reach each other by MPI",
-             fmt::format("A job launcher started {} processes, of which each finds itself alone{}. Start them with the "
-                         "mpirun of the MPI that Mirevo is linked with, or with srun --mpi=pmix.",
-                         *launched, code == MPI_SUCCESS ? "" : ": " + errorText(code)));
+  if (!launched && launcherRankAtStart == 0) return nullptr;  // of a job of one process, for all that is known
+  fatalError(
+      "Error: The processes of the job cannot reach each other by MPI",
+      fmt::format("A job launcher started {} processes, of which each finds itself alone{}. Start them with the "
+                  "mpirun of the MPI that Mirevo is linked with, or with srun --mpi=pmix.",
+                  launched ? std::to_string(*launched) : "several", code == MPI_SUCCESS ? "" : ": " + errorText(code)));
 }
 
 }  // namespace mirevo

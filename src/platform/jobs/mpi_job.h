@@ -6,9 +6,9 @@
 
 namespace mirevo {
 
-/// The part of this process in the MPI job that a launcher has started; null where it is alone. MPI is touched only
-/// when a job launcher has started this process together with others, so that a plain run pays nothing for it. Throws
-/// FatalError as joinJob() does. A build without MPI has it too: it refuses the jobs that would need MPI.
+/// Joins the MPI job that a launcher has started; null if this process is alone. MPI is initialised only under a
+/// launcher that does not say that it started a single process, so that a plain run pays nothing for it. Throws
+/// FatalError like joinJob(). In a build without MPI it refuses jobs of several processes.
 std::unique_ptr<Job> joinMpiJob();
 
 }  // namespace mirevo

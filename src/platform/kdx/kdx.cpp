@@ -1,6 +1,7 @@
 #include "platform/kdx/kdx.h"
 
 #include <algorithm>
+#include <span>
 #include <utility>
 
 #include <fmt/core.h>
@@ -22,7 +23,7 @@ bool isNameCharacter(char c) {
   return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') || c == '_' || c == '-' || c == '.';
 }
 
-/// Reads statement by statement; the open sections are a stack of its own, so that depth costs no call frames.
+/// Reads statement by statement, with its own stack of open sections instead of recursion.
 class KdxParser final {
  public:
   KdxParser(KdxDocument& document, std::string_view text) : cursor_(text) { open_.push_back(&document.root); }
@@ -41,6 +42,14 @@ class KdxParser final {
  private:
   bool fail(KdxPosition position, std::string message) {
     error_ = {position, std::move(message)};
+    return false;
+  }
+
+  bool failAtValue(KdxSyntaxError error, const std::string& keyword) {
+    error_ = std::move(error);
+    if (!error_.unquoted) return false;
+    error_.unquoted->keyword = keyword;
+    for (const KdxSection* section : std::span(open_).subspan(1)) error_.unquoted->sections.push_back(section->name());
     return false;
   }
 
@@ -116,7 +125,7 @@ class KdxParser final {
       cursor_.advance();
       cursor_.skipBlanks();
       std::variant<KdxValue, KdxSyntaxError> value = readKdxValue(cursor_, separator);
-      if (const auto* wrong = std::get_if<KdxSyntaxError>(&value)) return fail(wrong->position, wrong->message);
+      if (auto* wrong = std::get_if<KdxSyntaxError>(&value)) return failAtValue(std::move(*wrong), keyword.name);
       keyword.values.push_back(std::get<KdxValue>(std::move(value)));
       cursor_.skipBlanks();
       separator = ',';

@@ -14,13 +14,13 @@
 
 namespace mirevo {
 
-/// Where something stands in a KDX text; both count from 1, columns in bytes.
+/// A position in a KDX text; line and column count from 1, columns in bytes.
 struct KdxPosition {
   int line = 0;
   int column = 0;
 };
 
-/// One typed value of a keyword, with the place it was read from.
+/// One typed value of a keyword, with the position it was read from.
 struct KdxValue {
   std::variant<std::int32_t, double, std::string, DateRecord> value;
   KdxPosition position;
@@ -47,25 +47,25 @@ class KdxSection final {
   const std::vector<KdxKeyword>& keywords() const { return keywords_; }
   const std::vector<std::unique_ptr<KdxSection>>& sections() const { return sections_; }
 
-  /// The `instance`-th (from 1) nested section of that name; nullptr when there is none.
+  /// The `instance`-th (from 1) nested section with this name; nullptr when there is none.
   const KdxSection* section(std::string_view name, int instance = 1) const;
-  /// The `instance`-th keyword of that name; nullptr when there is none.
+  /// The `instance`-th (from 1) keyword with this name; nullptr when there is none.
   const KdxKeyword* keyword(std::string_view name, int instance = 1) const;
-  /// How often a keyword of that name stands here.
+  /// How often a keyword with this name occurs in this section.
   int keywordCount(std::string_view name) const;
 
   KdxKeyword& addKeyword(KdxKeyword keyword);
   KdxSection& addSection(std::string name, KdxPosition position);
 
  private:
-  /// Places of each name in file order. A section of a few entries is searched as it stands, which takes a fraction of
-  /// the memory: a setup has one long list and thousands of short sections.
+  /// Indices of the entries with each name, in file order. A section of a few entries is searched linearly, which takes
+  /// a fraction of the memory: a setup has one long list and thousands of short sections.
   class NameIndex {
    public:
-    /// Takes up the last of `elements`, whose names `nameOf` gives.
+    /// Adds the last of `elements`, whose names `nameOf` returns.
     template <class Elements, class NameOf>
     void add(const Elements& elements, NameOf nameOf);
-    /// The place of the `instance`-th element of that name; `elements.size()` when there is none.
+    /// The index of the `instance`-th element with this name; `elements.size()` when there is none.
     template <class Elements, class NameOf>
     std::size_t find(const Elements& elements, NameOf nameOf, std::string_view name, int instance) const;
     template <class Elements, class NameOf>
@@ -73,7 +73,7 @@ class KdxSection final {
 
    private:
     static constexpr std::size_t kSearchedAsItStands = 16;
-    /// Lets a look-up go without a copy of the name.
+    /// Allows look-ups without a copy of the name.
     struct NameHash {
       using is_transparent = void;
       std::size_t operator()(std::string_view name) const { return std::hash<std::string_view>{}(name); }
@@ -91,10 +91,18 @@ class KdxSection final {
   NameIndex sectionIndex_;
 };
 
-/// Why a KDX text cannot be read: the first place where it breaks, and what was expected there.
+/// A text without quotes where a value was expected.
+struct KdxUnquotedText {
+  std::string text;
+  std::string keyword = {};                ///< the keyword whose value it should be
+  std::vector<std::string> sections = {};  ///< that contain the keyword, from the outside in
+};
+
+/// Why a KDX text cannot be read: the position of the first error, and what was expected there.
 struct KdxSyntaxError {
   KdxPosition position;
   std::string message;
+  std::optional<KdxUnquotedText> unquoted = {};  ///< if that is the fault
 };
 
 /// A parsed KDX text: its targets are the sections of `root`.
@@ -106,8 +114,8 @@ struct KdxDocument {
 /// Parses a KDX text in time linear in its length. `sourceName` is kept for messages only.
 std::variant<KdxDocument, KdxSyntaxError> parseKdx(std::string sourceName, std::string_view text);
 
-/// `2001-01-31`, with ` 12:30` or `T12:30` behind it, and `:15` behind that; nothing when any of `text` has another
-/// form. The fields are taken apart and not judged: month 13 is a date here.
+/// `2001-01-31`, optionally followed by ` 12:30` or `T12:30`, and that by `:15`; empty when `text` has any other form.
+/// The fields are not checked: month 13 is accepted here.
 std::optional<DateRecord> parseKdxDate(std::string_view text);
 
 }  // namespace mirevo

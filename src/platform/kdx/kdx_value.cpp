@@ -16,7 +16,7 @@ bool isBlank(char c) {
   return c == ' ' || c == '\t' || c == '\r';
 }
 
-/// Reads the text between quotes, the same quote inside written twice.
+/// Reads a text between quotes; the same quote inside the text is written twice.
 std::variant<KdxValue, KdxSyntaxError> readText(KdxCursor& cursor) {
   const KdxPosition start = cursor.position();
   const std::string_view line = cursor.restOfLine();
@@ -42,7 +42,7 @@ std::variant<KdxValue, KdxSyntaxError> readText(KdxCursor& cursor) {
   return KdxValue{std::move(content), start};
 }
 
-/// Digits alone beyond 32 bits are a real: they are good where a real is wanted and refused where an integer is.
+/// Digits beyond 32 bits are read as a real, which is valid where a real is expected and refused where an integer is.
 std::optional<KdxValue> readNumber(std::string_view word, KdxPosition start) {
   if (const auto integer = parseInteger(word)) return KdxValue{*integer, start};
   if (const auto real = parseReal(word)) return KdxValue{*real, start};
@@ -119,7 +119,8 @@ std::variant<KdxValue, KdxSyntaxError> readKdxValue(KdxCursor& cursor, char sepa
     return *std::move(number);
   }
   return KdxSyntaxError{
-      start, fmt::format("expected a number, a date or a text between quotes, found {}", quotedForMessage(item))};
+      start, fmt::format("expected a number, a date or a text between quotes, found {}", quotedForMessage(item)),
+      KdxUnquotedText{std::string(item)}};
 }
 
 std::optional<DateRecord> parseKdxDate(std::string_view text) {

@@ -8,20 +8,20 @@
 
 namespace mirevo {
 
-/// A place in a KDX text that moves on and knows its line and column.
+/// A reading position in a KDX text, with its line and column.
 class KdxCursor final {
  public:
-  /// Starts behind a byte-order mark.
+  /// Starts after a byte-order mark, if there is one.
   explicit KdxCursor(std::string_view text);
 
   bool atEnd() const { return place_ == text_.size(); }
   bool atLineEndOrComment() const;
-  /// The next character; a line end where there is none.
+  /// The next character; a line end at the end of the text.
   char peek() const { return atEnd() ? '\n' : text_[place_]; }
-  /// What is left of the line, its end excluded.
+  /// The rest of the line, without its end.
   std::string_view restOfLine() const;
   KdxPosition position() const;
-  /// The next thing, in words for a message: "'=', found ...".
+  /// What comes next, in words for a message.
   std::string describeNext() const;
 
   void advance(std::size_t count = 1) { place_ += count; }
@@ -36,7 +36,8 @@ class KdxCursor final {
   int line_ = 1;
 };
 
-/// Reads one value: a text in quotes, an integer, a real or a date. `separator`, '=' or ',', is what stood before it.
+/// Reads one value: a text in quotes, an integer, a real or a date. `separator`, '=' or ',', is the character before
+/// it.
 std::variant<KdxValue, KdxSyntaxError> readKdxValue(KdxCursor& cursor, char separator);
 
 }  // namespace mirevo

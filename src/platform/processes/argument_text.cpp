@@ -14,7 +14,7 @@ bool isProtectedInQuotes(char c) {
 std::optional<std::vector<std::string>> splitArguments(std::string_view text, std::string& reason) {
   std::vector<std::string> words;
   std::string word;
-  bool inWord = false;  // tells an empty quoted word from no word
+  bool inWord = false;  // distinguishes an empty quoted word from no word
   char quote = '\0';
   std::size_t quotePosition = 0;
   for (std::size_t i = 0; i < text.size(); ++i) {

@@ -13,16 +13,16 @@
 namespace mirevo {
 namespace {
 
-/// The guard's whole life. Between fork and exit only async-signal-safe calls are made: the program may have threads
-/// (of its MPI library) that held a lock when it was forked.
+/// The guard's process. Makes only async-signal-safe calls: threads of the program (of its MPI library) may have held a
+/// lock at the fork.
 [[noreturn]] void guard(pid_t parent, const ProcessGroupTable& table, const ProcessMark& mark) {
-  // A session of its own keeps the terminal's signals away; those sent on purpose to everything of the user are
-  // ignored.
+  // A session of its own keeps the terminal's signals away; signals sent to all processes of the user are ignored.
   ::setsid();
   for (const int signal : {SIGINT, SIGTERM, SIGHUP, SIGQUIT, SIGPIPE, SIGUSR1, SIGUSR2}) ::signal(signal, SIG_IGN);
   for (const int signal : {SIGABRT, SIGSEGV, SIGILL, SIGFPE, SIGBUS}) ::signal(signal, SIG_DFL);
   ::prctl(PR_SET_NAME, "mirevo_guard");
-  // Holding a descriptor would keep a pipe open whose reader waits for the program's end; a folder, a file system busy.
+  // An open descriptor would keep a pipe open whose reader waits for the program's end; a current folder would keep its
+  // file system busy.
   ::syscall(SYS_close_range, 0U, UINT_MAX, 0U);
   if (::chdir("/") != 0) ::_exit(1);
 
@@ -48,7 +48,7 @@ ChildGuard::~ChildGuard() {
 
 bool ChildGuard::start(const ProcessGroupTable& table, const ProcessMark& mark, std::string& reason) {
   const pid_t parent = ::getpid();
-  // Blocked over the fork, so that no handler of the program ever runs in the guard.
+  // Blocked during the fork, so that no handler of the program ever runs in the guard.
   sigset_t all;
   sigset_t before;
   ::sigfillset(&all);

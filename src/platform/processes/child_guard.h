@@ -8,14 +8,14 @@
 
 namespace mirevo {
 
-/// A small process of our own that outlives the program by a moment: when the program has ended, in whatever way (kill
-/// -9 included), it ends the process groups that still stand in the table and whatever else bears the mark, and then
-/// itself. The kernel's own signal on a parent's death reaches direct children only; this reaches what they have
-/// started, too. It sleeps until then and is told nothing, so it costs a model run nothing.
+/// A small process that outlives the program by a moment: when the program has ended, in whatever way (including kill
+/// -9), it ends the process groups that are still in the table and every other process with the mark, and then itself.
+/// The kernel's parent-death signal reaches direct children only; the guard also reaches what they have started. Until
+/// then it sleeps and costs a model run nothing.
 class ChildGuard final {
  public:
   ChildGuard() = default;
-  /// Ends the guard. Groups that still run are not touched.
+  /// Ends the guard, but not the groups that are still running.
   ~ChildGuard();
   ChildGuard(const ChildGuard&) = delete;
   ChildGuard& operator=(const ChildGuard&) = delete;

@@ -39,7 +39,7 @@ constexpr std::array<std::string_view, 9> kThreadVariables = {
 
 constexpr std::size_t kOutputTailBytes = 65536;
 constexpr std::size_t kOutputLineBytes = 400;
-/// How long a killed process may take to be gone; one that waits for a lost network drive may take for ever.
+/// Longest wait for a killed process to end; one that waits for a lost network drive may never end.
 constexpr double kKilledSeconds = 10.0;
 constexpr int kGroupLookMilliseconds = 20;
 
@@ -47,7 +47,7 @@ std::string baseName(const std::string& path) {
   return std::filesystem::path(path).filename().string();
 }
 
-/// Opens with a number above 2, so that it can be moved onto the standard descriptors of a child.
+/// Opens with a descriptor above 2, so that it can be duplicated onto the standard descriptors of a child.
 int openAboveStandard(const char* path, int flags, unsigned mode) {
   const int fd = ::open(path, flags | O_CLOEXEC, mode);
   if (fd < 0 || fd > STDERR_FILENO) return fd;
@@ -58,7 +58,7 @@ int openAboveStandard(const char* path, int flags, unsigned mode) {
   return moved;
 }
 
-/// Why an existing file could not be executed because of its first line, if that is why.
+/// A hint if an existing file could not be executed because of its "#!" line, else empty.
 std::string interpreterHint(const std::string& file) {
   std::array<char, 256> head{};
   const int fd = ::open(file.c_str(), O_RDONLY | O_CLOEXEC);
@@ -86,7 +86,7 @@ std::string readTail(int fd) {
   return text;
 }
 
-/// Returns when no process of these groups runs any more, or after `seconds`.
+/// Returns when no process of these groups is running any more, or after `seconds`.
 void awaitEndOfGroups(std::span<const pid_t> groups, double seconds) {
   const double deadline = runTimeClock() + seconds;
   while (!runningMembers(groups).empty() && runTimeClock() < deadline) {
@@ -95,7 +95,7 @@ void awaitEndOfGroups(std::span<const pid_t> groups, double seconds) {
   }
 }
 
-/// A line of output made fit for a log: no control characters, not too long.
+/// A line of output prepared for a log: without control characters, and not too long.
 std::string printable(std::string_view line) {
   std::string text(line.substr(0, kOutputLineBytes));
   for (char& c : text) {
@@ -125,7 +125,7 @@ bool PosixProcessLauncher::initialise(const LauncherSettings& settings) {
   haltProcesses();
   closeDescriptors();
   slots_.clear();
-  // Where the program was started with this signal ignored, the kernel would forget how its children ended.
+  // If this signal was ignored at the start of the program, the kernel would discard how its children ended.
   ::signal(SIGCHLD, SIG_DFL);
   graceSeconds_ = settings.graceSeconds;
   maxSeconds_ = settings.maxSeconds;
@@ -217,9 +217,9 @@ std::atomic<pid_t>& PosixProcessLauncher::groupEntry(const Slot& slot) const {
   return groups_->entries()[static_cast<std::size_t>(&slot - slots_.data())];
 }
 
-/// An empty log for the next batch. The one of the last batch serves again when nothing was printed and it is still
-/// there, which saves removing and creating a file every run; it is never truncated, as a process of an earlier run may
-/// still hold it and because that costs more.
+/// Provides an empty log for the next batch. The log of the last batch is reused if it is empty and still there, which
+/// saves removing and creating a file for every run. It is never truncated: that costs more, and a process of an
+/// earlier run may still have it open.
 bool PosixProcessLauncher::renewLog(Slot& slot) {
   struct stat status {};
   if (slot.log >= 0 && ::fstat(slot.log, &status) == 0 && status.st_size == 0 && status.st_nlink > 0) return true;
@@ -268,7 +268,7 @@ void PosixProcessLauncher::startItem(Slot& slot) {
 void PosixProcessLauncher::isExecuting(int slotNumber, std::int32_t& executing, std::int32_t& status) {
   Slot& slot = slotAt(slotNumber);
   if (slot.pidfd >= 0) {
-    // Looked at and not reaped: while it is there its number cannot become another group's.
+    // Not reaped (WNOWAIT): until then its number cannot be reused for another group.
     siginfo_t ended{};
     const int result = ::waitid(P_PIDFD, static_cast<id_t>(slot.pidfd), &ended, WEXITED | WNOHANG | WNOWAIT);
     if (result == 0 && ended.si_pid != 0) {
@@ -286,11 +286,11 @@ void PosixProcessLauncher::isExecuting(int slotNumber, std::int32_t& executing, 
                                                                                    : BatchStatus::failed);
 }
 
-/// The first process of the item's group has ended: ends the rest of the group and starts the batch's next item.
+/// After the first process of the item has ended: ends the rest of its group and starts the next item of the batch.
 void PosixProcessLauncher::finishItem(Slot& slot, int code, int status) {
   endRestOfGroup(slot);
   const std::string name = baseName(slot.commands[slot.item].file());
-  if (slot.overdue) {  // however it took its end
+  if (slot.overdue) {  // however it ended
     slot.failure = {BatchFailure::Kind::timedOut, 0,
                     fmt::format("{} was ended because it ran longer than {:g} seconds", name, maxSeconds_)};
   } else if (code != CLD_EXITED) {
@@ -306,8 +306,7 @@ void PosixProcessLauncher::finishItem(Slot& slot, int code, int status) {
   }
 }
 
-/// Ends a batch that has run for too long, without waiting for it: SIGTERM first, and SIGKILL when it has not ended
-/// within the grace time.
+/// Ends a batch that has run too long, without waiting for it: SIGTERM first, and SIGKILL after the grace time.
 void PosixProcessLauncher::endOverdue(Slot& slot) {
   const double now = clock_();
   if (slot.overdue) {
@@ -318,17 +317,17 @@ void PosixProcessLauncher::endOverdue(Slot& slot) {
   }
 }
 
-/// Until a running slot's batch has to be looked at though it has not ended.
+/// Seconds until a running batch must be checked even if it has not ended.
 double PosixProcessLauncher::secondsToLook(const Slot& slot) const {
   constexpr double kNever = std::numeric_limits<double>::infinity();
   constexpr double kShortest = 0.001;
   if (!slot.overdue) return maxSeconds_ > 0.0 ? std::max(slot.started + maxSeconds_ - clock_(), kShortest) : kNever;
   const double grace = *slot.overdue + graceSeconds_ - clock_();
-  return grace > 0.0 ? std::max(grace, kShortest) : kNever;  // killed: its end is all there is to wait for
+  return grace > 0.0 ? std::max(grace, kShortest) : kNever;  // killed: nothing left to do but wait for its end
 }
 
-/// Reaps the group's ended first process and ends what it left behind. The group is stopped first, so that between
-/// being seen and being ended nobody in it can go away, or start more.
+/// Reaps the ended first process of the group and ends the processes that it left behind. The group is stopped first,
+/// so that none of them can end or start others between being listed and being killed.
 void PosixProcessLauncher::endRestOfGroup(Slot& slot) {
   ::kill(-slot.group, SIGSTOP);
   siginfo_t ignored{};
@@ -336,7 +335,7 @@ void PosixProcessLauncher::endRestOfGroup(Slot& slot) {
   }
   ::close(slot.pidfd);
   slot.pidfd = -1;
-  // With its first process reaped a group without others is gone; one with others keeps its number.
+  // After its first process is reaped, a group without others is gone; one with others keeps its number.
   if (::kill(-slot.group, 0) == 0) {
     const auto members = runningMembers(std::span(&slot.group, 1));
     ::kill(-slot.group, SIGKILL);
@@ -388,7 +387,7 @@ void PosixProcessLauncher::waitForChange(double seconds) {
 
 void PosixProcessLauncher::haltProcesses() {
   haltGroups();
-  if (guard_) mark_.endBearers();  // without a guard nothing was started
+  if (guard_) mark_.endBearers();  // without a guard no process was started
 }
 
 void PosixProcessLauncher::haltGroups() {
@@ -397,7 +396,7 @@ void PosixProcessLauncher::haltGroups() {
     if (slot.pidfd >= 0) running.push_back(slot.group);
   }
   if (running.empty()) return;
-  // The groups' first processes stay unreaped until the end, so that every number means the group that it meant.
+  // The first processes of the groups are not reaped until the end, so that their numbers are not reused.
   groups_->signalAll(SIGTERM);
   awaitEndOfGroups(running, graceSeconds_);
   groups_->signalAll(SIGKILL);
@@ -414,7 +413,7 @@ void PosixProcessLauncher::haltGroups() {
   }
 }
 
-/// The function is one of a library that exists for another system only.
+/// The function belongs to a library that exists only for another operating system.
 ResistanceUpdate PosixProcessLauncher::r35UpdateResistanceNumbers(const std::string& fileName) {
   const std::string extension = std::filesystem::path(fileName).extension().string();
   return equalIgnoringCase(extension, ".qcsr") ? ResistanceUpdate::libraryNotFound : ResistanceUpdate::wrongExtension;

@@ -18,13 +18,13 @@
 
 namespace mirevo {
 
-/// Runs batches as processes of this machine. A batch's item is a process group of its own; `mirevo_batch.log` in the
-/// slot's folder takes what the batch prints. When an item's first process ends, others of its group that still run are
-/// ended. One that has left its group on purpose (a daemon) may serve later runs. No process of a batch outlives this
-/// program, however it ends.
+/// Runs batches as processes of this machine. Each item of a batch is a process group of its own; the output of the
+/// batch goes to `mirevo_batch.log` in the slot's folder. When the first process of an item ends, the rest of its group
+/// is ended. A process that has left the group on purpose (a daemon) may serve later runs. No process of a batch
+/// outlives this program, however it ends.
 class PosixProcessLauncher final : public ProcessLauncher {
  public:
-  /// Seconds from any origin, never running backwards.
+  /// Seconds from an arbitrary origin, never decreasing.
   using MonotonicClock = std::function<double()>;
 
   explicit PosixProcessLauncher(MonotonicClock clock = runTimeClock) : clock_(std::move(clock)) {}
@@ -45,13 +45,13 @@ class PosixProcessLauncher final : public ProcessLauncher {
  private:
   struct Slot {
     std::string folder;
-    std::vector<SpawnCommand> commands;  ///< one a batch item
-    std::size_t item = 0;                ///< that runs, or ran last
+    std::vector<SpawnCommand> commands;  ///< one per batch item
+    std::size_t item = 0;                ///< the item that runs, or ran last
     int pidfd = -1;                      ///< -1 while nothing runs
     pid_t group = 0;
     double started = 0.0;           ///< when the batch began
-    std::optional<double> overdue;  ///< when it was told to end because it ran too long
-    int log = -1;                   ///< open for the whole run, so that a run that prints nothing makes no file
+    std::optional<double> overdue;  ///< when it was sent SIGTERM because it ran too long
+    int log = -1;                   ///< open for the whole run, so that a model run that prints nothing creates no file
     BatchFailure failure;
     std::string leftBehind;
   };

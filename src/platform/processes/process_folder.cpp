@@ -30,13 +30,13 @@ namespace {
   fatalError(fmt::format("Unable to {} {}: {}", what, path, std::strerror(error)));
 }
 
-/// Whether the error says that something seen a moment ago is gone. Others may be at work where we look: a setup beside
-/// its model has the job's other ranks making their folders, and runs of other setups, in the folder that is copied.
+/// Whether the error means that an entry seen a moment ago is gone. If a setup is in its model's folder, other ranks of
+/// the job and runs of other setups may be working in the folder that is copied.
 bool hasVanished(int error) {
   return error == ENOENT || error == ESTALE;
 }
 
-/// The names in a folder, sorted, without "." and ".."; nothing when there is no such folder.
+/// The names in a folder, sorted, without "." and ".."; empty when there is no such folder.
 std::optional<std::vector<std::string>> namesIn(const std::string& path) {
   const std::unique_ptr<DIR, int (*)(DIR*)> folder(::opendir(path.c_str()), &::closedir);
   if (!folder && hasVanished(errno)) return std::nullopt;
@@ -53,7 +53,7 @@ std::optional<std::vector<std::string>> namesIn(const std::string& path) {
   return names;
 }
 
-/// Nothing when there is nothing at `path`.
+/// The status of `path` itself, not of a link's target; empty when nothing is there.
 std::optional<struct stat> statusOf(const std::string& path) {
   struct stat status {};
   if (::lstat(path.c_str(), &status) == 0) return status;
@@ -65,9 +65,9 @@ bool isFolder(const struct stat& status) {
   return S_ISDIR(status.st_mode);
 }
 
-/// Removes a file, a link, or a folder with all that it holds. Nothing need be there.
+/// Removes a file, a link, or a folder with all its content, if there is one.
 void removeTree(const std::string& root) {
-  // Depth-first with a stack of our own: each folder is met once to empty it and, above its entries, once to remove it.
+  // Depth-first without recursion: each folder is visited once to push its entries and, after these, once to remove it.
   struct Visit {
     std::string path;
     bool emptied;
@@ -87,7 +87,7 @@ void removeTree(const std::string& root) {
       if (::unlink(visit.path.c_str()) != 0 && !hasVanished(errno)) fail("remove", visit.path, errno);
       continue;
     }
-    ::chmod(visit.path.c_str(), S_IRWXU);  // a model may have made it read-only; a failure shows below
+    ::chmod(visit.path.c_str(), S_IRWXU);  // a model may have made it read-only; a failure is noticed below
     visits.push_back({visit.path, true});
     const auto names = namesIn(visit.path);
     if (!names) continue;
@@ -109,7 +109,7 @@ void copyFile(const std::string& source, const std::string& target, const struct
   if (status.st_size > 0 && !copyContent(from.get(), to.get())) {
     const int error = errno;
     if (!hasVanished(error)) fail("write", target, error);
-    ::unlink(target.c_str());  // removed on another machine, whose disk this is
+    ::unlink(target.c_str());  // removed on another machine that has this disk
     return;
   }
   if (::fchmod(to.get(), status.st_mode & 07777) != 0) fail("set the mode of", target, errno);
@@ -146,7 +146,7 @@ class ProcessFolderNames final {
     isKnown_ = ::stat(std::string(prefix.substr(0, slash + 1)).c_str(), &parent_) == 0;
   }
 
-  /// By the folder's identity, as its path may differ by a link.
+  /// Compares device and inode, as the path may contain a link.
   bool liesIn(const struct stat& folder) const {
     return isKnown_ && folder.st_dev == parent_.st_dev && folder.st_ino == parent_.st_ino;
   }
@@ -167,7 +167,7 @@ struct CopiedFolder {
   struct stat status;
 };
 
-/// The copy of the model's own part of a folder, without recursion.
+/// Copies a folder without what runs have made in it; without recursion.
 class FolderCopy final {
  public:
   FolderCopy(const std::string& source, const std::string& target, std::string_view processFolderPrefix)
@@ -180,7 +180,7 @@ class FolderCopy final {
       pending_.pop_back();
       copyFolder(below);
     }
-    // A folder is writable while it is filled; its own mode and time follow when everything is in.
+    // Folders are writable while they are filled; their modes and times are set afterwards.
     for (auto folder = made_.rbegin(); folder != made_.rend(); ++folder) {
       const Descriptor opened(::open(folder->target.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
       if (opened.get() < 0 || ::fchmod(opened.get(), (folder->status.st_mode & 07777) | S_IRWXU) != 0) {

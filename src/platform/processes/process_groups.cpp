@@ -19,7 +19,7 @@ std::atomic<const ProcessGroupTable*> currentTable{nullptr};
 
 static_assert(std::atomic<pid_t>::is_always_lock_free && std::atomic<const ProcessGroupTable*>::is_always_lock_free);
 
-/// One process of /proc; nothing when it has ended meanwhile, or is a zombie.
+/// A process of /proc; empty if it has ended in the meantime or is a zombie.
 std::optional<GroupMember> readProcess(const std::string& id) {
   std::string reason;
   const auto text = readTextFile("/proc/" + id + "/stat", reason);

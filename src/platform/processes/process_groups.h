@@ -8,12 +8,12 @@
 
 namespace mirevo {
 
-/// The process groups that run at present, one entry a slot (0 = none). The memory is shared with processes forked
-/// later, so that the guard reads what its parent and the children have written; nothing is locked, so that a signal
-/// handler may read it.
+/// The process groups that are running, one entry per slot (0 = none). The memory is shared with processes forked
+/// later, so that the guard sees what its parent and the children write; it is lock-free, so that a signal handler may
+/// read it.
 class ProcessGroupTable final {
  public:
-  /// Throws std::bad_alloc when the memory cannot be had.
+  /// Throws std::bad_alloc when the memory cannot be allocated.
   explicit ProcessGroupTable(int entryCount);
   ~ProcessGroupTable();
   ProcessGroupTable(const ProcessGroupTable&) = delete;
@@ -31,7 +31,7 @@ class ProcessGroupTable final {
   std::span<std::atomic<pid_t>> entries_;
 };
 
-/// Ends (SIGKILL) every model process that runs. Async-signal-safe: for signal handlers, which must not wait.
+/// Ends (SIGKILL) every running model process. Async-signal-safe: for signal handlers, which must not wait.
 void haltProcessesFromSignal() noexcept;
 
 /// A process found in a group.
@@ -41,8 +41,8 @@ struct GroupMember {
   std::string name;
 };
 
-/// The processes of these groups that still run (those that have ended and only wait to be reaped are left out), by a
-/// look through all processes of the system: some milliseconds.
+/// The processes of these groups that are still running (zombies excluded), found among all processes of the system,
+/// which takes some milliseconds.
 std::vector<GroupMember> runningMembers(std::span<const pid_t> groups);
 
 }  // namespace mirevo

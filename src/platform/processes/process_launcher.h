@@ -10,22 +10,22 @@ namespace mirevo {
 /// One item of the simulation batch; the items of a batch run one after another.
 struct BatchItem {
   std::string batchFileName;  ///< absolute path in the base folder
-  std::string arguments;      ///< as the setup has them; split as a shell splits words
+  std::string arguments;      ///< as in the setup; split as a shell splits words
 };
 
 struct LauncherSettings {
-  std::string baseFolder;             ///< absolute; holds the first batch file, is copied and never written
-  std::string processFolderPrefix;    ///< absolute; a slot runs in this text followed by its folder's number
+  std::string baseFolder;             ///< absolute; folder of the first batch file; copied, never written to
+  std::string processFolderPrefix;    ///< absolute; the slot's folder without its number, which follows
   std::vector<BatchItem> batchItems;  ///< at least one
   int slotCount = 1;
-  int firstFolderNumber = 1;               ///< the number of slot 1's folder; the other slots' follow
-  bool useSingleThread = false;            ///< set the usual thread-count variables to 1 for the model
-  std::function<bool()> isCancelled = {};  ///< asked between two slots' folders; true throws RunCancelled
+  int firstFolderNumber = 1;               ///< number of the folder of slot 1; those of the other slots follow
+  bool useSingleThread = false;            ///< sets the usual thread-count variables to 1 for the model
+  std::function<bool()> isCancelled = {};  ///< called between the folders of two slots; true throws RunCancelled
   double graceSeconds = 2.0;               ///< between SIGTERM and SIGKILL when processes are halted
-  double maxSeconds = 0.0;  ///< longest time that a slot's batch may run, all of its items together; 0: any
+  double maxSeconds = 0.0;  ///< longest time that a slot's batch may run, all items together; 0: no limit
 };
 
-/// How a slot's batch ended, or that it has not yet.
+/// How a slot's batch ended.
 enum class BatchStatus : std::int32_t { succeeded = 0, failed = 1 };
 
 /// Why a batch failed.
@@ -48,7 +48,7 @@ enum class ResistanceUpdate {
   wrongExtension,
 };
 
-/// Starts and watches the model's processes, one batch a slot, each slot in a folder of its own. Slots count from 1.
+/// Starts and watches the model's processes, one batch per slot, each slot in a folder of its own. Slots count from 1.
 class ProcessLauncher {
  public:
   ProcessLauncher() = default;
@@ -56,7 +56,7 @@ class ProcessLauncher {
   ProcessLauncher& operator=(const ProcessLauncher&) = delete;
   virtual ~ProcessLauncher() = default;
 
-  /// Makes every slot's process folder anew as a copy of the base folder. False when that fails; lastError() says why.
+  /// Makes every slot's process folder a fresh copy of the base folder. False when that fails; lastError() says why.
   virtual bool initialise(const LauncherSettings& settings) = 0;
   virtual const std::string& lastError() const = 0;
 
@@ -66,14 +66,14 @@ class ProcessLauncher {
   /// Starts the slot's batch. A batch that cannot be started is reported by isExecuting() as failed.
   virtual void createProcesses(int slot) = 0;
 
-  /// `executing` becomes 1 while the slot's batch runs, else 0; `status` is then a BatchStatus. A batch that is seen
-  /// to have run longer than it may is ended here, and still runs until it is gone.
+  /// `executing` becomes 1 while the slot's batch runs, else 0; `status` is then a BatchStatus. A batch that has run
+  /// too long is ended here, but counts as executing until it is gone.
   virtual void isExecuting(int slot, std::int32_t& executing, std::int32_t& status) = 0;
 
   /// Why the slot's last batch failed.
   virtual BatchFailure failure(int slot) const = 0;
 
-  /// One line when the slot's last batch left processes behind that had to be ended, else empty.
+  /// One line if the slot's last batch left processes behind that had to be ended, else empty.
   virtual std::string leftBehind(int slot) const = 0;
 
   /// The last lines that the slot's last batch printed, at most `lineCount`.
@@ -82,7 +82,7 @@ class ProcessLauncher {
   /// Waits until a running batch has changed its state, a signal arrives, or `seconds` have passed.
   virtual void waitForChange(double seconds) = 0;
 
-  /// Ends every process that was started and still runs, and does not return before they are gone.
+  /// Ends every process that was started and is still running, and returns when they are gone.
   virtual void haltProcesses() = 0;
 
   virtual ResistanceUpdate r35UpdateResistanceNumbers(const std::string& fileName) = 0;

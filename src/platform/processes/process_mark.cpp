@@ -21,13 +21,13 @@
 namespace mirevo {
 namespace {
 
-// A guard forked from a program with threads may not allocate, so that all of this lives on the stack.
+// A guard forked from a program with threads must not allocate, so all buffers are on the stack.
 
 constexpr int kMostRounds = 100;
-constexpr timespec kPause{0, 20'000'000};  ///< for killed processes to go
+constexpr timespec kPause{0, 20'000'000};  ///< for killed processes to end
 
-/// Whether the text stands in the environment of the process, a folder name of /proc. Not of one that has ended, nor of
-/// another user's.
+/// Whether the environment of the process (a folder name of /proc) contains the text. False for a process that has
+/// ended or belongs to another user.
 bool isInEnvironment(std::string_view text, const char* process) noexcept {
   std::array<char, 64> path{};
   const std::size_t length = std::strlen(process);
@@ -40,7 +40,7 @@ bool isInEnvironment(std::string_view text, const char* process) noexcept {
   const Descriptor file(::open(path.data(), O_RDONLY | O_CLOEXEC));
   if (file.get() < 0) return false;
   std::array<char, 8192> bytes{};
-  std::size_t kept = 0;  // the end of the piece before, in which the text may begin
+  std::size_t kept = 0;  // bytes kept from the end of the previous piece, in which the text may begin
   while (true) {
     const ssize_t count = ::read(file.get(), bytes.data() + kept, bytes.size() - kept);
     if (count <= 0) return false;
@@ -51,7 +51,7 @@ bool isInEnvironment(std::string_view text, const char* process) noexcept {
   }
 }
 
-/// Returns whether there was any.
+/// Kills every process with the mark. Returns whether there was any.
 bool killBearers(std::string_view mark) noexcept {
   const Descriptor folder(::open("/proc", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
   alignas(dirent64) std::array<char, 8192> entries{};

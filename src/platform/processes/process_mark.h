@@ -4,19 +4,19 @@
 
 namespace mirevo {
 
-/// A variable in the environment of whatever a run's models start, inherited by what that starts in turn. By it those
-/// processes are found that have left their process group and their parent, as a daemon does. One that empties its
-/// environment is out of reach.
+/// A variable in the environment of all processes of a run's models, inherited by what they start. It identifies
+/// processes that have left their process group and their parent, as daemons do. One that clears its environment cannot
+/// be found.
 class ProcessMark final {
  public:
-  /// One that no other run has.
+  /// Makes a mark that no other run has.
   ProcessMark();
 
   /// "MIREVO_RUN=..."
   const char* variable() const { return text_.data(); }
 
-  /// Ends (SIGKILL) every process of this machine that bears the mark, and looks again until there is none or two
-  /// seconds have passed. Async-signal-safe; some milliseconds where there is none.
+  /// Ends (SIGKILL) every process of this machine that has the mark, and looks again until there is none or two seconds
+  /// have passed. Async-signal-safe; takes some milliseconds if there is none.
   void endBearers() const noexcept;
 
  private:

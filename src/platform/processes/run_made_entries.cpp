@@ -19,8 +19,8 @@ namespace {
 
 constexpr std::string_view kSetupEnding = ".kdx";
 
-/// `text` is a name behind that of the setup. A run that was killed may have left a file half-written, with
-/// kTemporaryEnding behind it.
+/// Whether `text`, the part of a name after that of the setup, is that of a run's file. A killed run may have left it
+/// half-written, with kTemporaryEnding at the end.
 bool matches(std::string_view text, const RunFile& file) {
   if (text.ends_with(kTemporaryEnding)) text.remove_suffix(kTemporaryEnding.size());
   if (!takeText(text, file.stem) || (file.isNumbered && takeDigits(text).empty())) return false;
@@ -28,7 +28,7 @@ bool matches(std::string_view text, const RunFile& file) {
   return takeText(text, ".") && !takeDigits(text).empty() && text == file.extension;
 }
 
-/// Whether the file names this program in one of its first lines, as every log and result file does.
+/// Whether the file names this program in its first lines, as every log and result file does.
 bool namesThisProgram(const std::string& path) {
   const Descriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
   std::array<char, 1024> head{};
@@ -41,7 +41,7 @@ bool namesThisProgram(const std::string& path) {
   });
 }
 
-/// Whether this is a process folder of a setup that lies elsewhere.
+/// Whether this is a process folder of a setup in another folder.
 bool isProcessFolder(const std::string& path) {
   constexpr std::string_view kMark = run_files::kProcessFolder.stem;
   const auto mark = path.rfind(kMark);

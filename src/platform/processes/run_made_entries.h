@@ -7,12 +7,12 @@
 
 namespace mirevo {
 
-/// Tells what runs of this program have made in a folder from what is the model's own. Where a setup lies in the
-/// model's folder both stand side by side, and a copy of the folder is to have the model's own only: results grow from
-/// run to run, and another rank of the job may be writing them or renaming them meanwhile.
+/// Tells the files and folders that runs of this program have made in a folder from those of the model. If a setup is
+/// in the model's folder both are there, and copies of the folder must have those of the model only: results grow from
+/// run to run, and another rank of the job may be writing or renaming them.
 class RunMadeEntries final {
  public:
-  /// `names` are those of everything in the folder; setups are known by their ending ".kdx".
+  /// `names` are those of all entries of the folder; setups are recognised by their ending ".kdx".
   RunMadeEntries(std::string folder, std::span<const std::string> names);
 
   bool contains(std::string_view name) const;

@@ -17,7 +17,7 @@ namespace {
 
 constexpr char kShell[] = "/bin/sh";
 
-/// Shared with the child, which runs in our memory: what it is to do, and how far it came.
+/// Shared with the child, which runs in this program's memory: its task, and the step that failed.
 struct ChildTask {
   const SpawnCommand* command = nullptr;
   const SpawnSurroundings* surroundings = nullptr;
@@ -38,7 +38,7 @@ bool hasRunBit(const char* file) {
 }
 
 /// Runs in the child. The parent is suspended and all signals are blocked until the command has replaced this program,
-/// so that only system calls may be made here and nothing of the parent's memory but `task` be changed.
+/// so only system calls may be made here, and nothing in the parent's memory except `task` may be changed.
 __attribute__((no_sanitize("address", "undefined"))) int runChild(void* argument) {
   ChildTask& task = *static_cast<ChildTask*>(argument);
   const SpawnSurroundings& surroundings = *task.surroundings;
@@ -46,7 +46,7 @@ __attribute__((no_sanitize("address", "undefined"))) int runChild(void* argument
 
   ::setpgid(0, 0);
   ::prctl(PR_SET_PDEATHSIG, SIGKILL);
-  if (::getppid() != task.parent) ::_exit(127);  // it died before the kernel was asked to watch it
+  if (::getppid() != task.parent) ::_exit(127);  // the parent died before the call above
   surroundings.groupEntry->store(::getpid());
 
   for (int signal = 1; signal < NSIG; ++signal) ::signal(signal, SIG_DFL);
@@ -78,12 +78,11 @@ SpawnCommand::SpawnCommand(std::string file, std::string folder, std::vector<std
   shellArgv_.push_back(nullptr);
 }
 
-// posix_spawn cannot ask for a signal on the parent's death, and fork copies the page tables of a program that may have
-// grown large. So the child is cloned the way posix_spawn does it itself: it borrows this program's memory on a stack
-// of its own while the parent is suspended (CLONE_VM | CLONE_VFORK), which costs the same however large the program is
-// and lets the child report an error by writing it where the parent looks. Unlike vfork, whose child shares the
-// caller's stack frame, a function of its own cannot be upset by what the compiler keeps in that frame. CLONE_PIDFD
-// gives the descriptor to wait on in the same call.
+// posix_spawn offers no parent-death signal, and fork copies the page tables of a program that may be large. The child
+// is therefore cloned as posix_spawn does it: it uses this program's memory, on a stack of its own, while the parent is
+// suspended (CLONE_VM | CLONE_VFORK). That costs the same whatever the size of the program, and lets the child report
+// an error in memory. With vfork the child would share the caller's stack frame, which is not safe with optimising
+// compilers. CLONE_PIDFD returns the descriptor to wait on in the same call.
 SpawnedProcess spawnProcess(const SpawnCommand& command, const SpawnSurroundings& surroundings) {
   alignas(16) static std::array<char, 32768> stack;
   ChildTask task{&command, &surroundings, ::getpid(), nullptr, 0};

@@ -8,7 +8,7 @@
 
 namespace mirevo {
 
-/// A command made ready once, so that starting it allocates nothing.
+/// A command prepared once, so that starting it allocates nothing.
 class SpawnCommand final {
  public:
   /// `file` is executed in `folder` with these arguments; both paths are absolute.
@@ -26,7 +26,7 @@ class SpawnCommand final {
   char* const* shellArgv() const { return shellArgv_.data(); }
 
  private:
-  // Behind pointers: `shellArgv_` points into them and must go on doing so when the command is moved.
+  // Pointers, so that those in `shellArgv_` stay valid when the command is moved.
   std::unique_ptr<std::string> file_;
   std::unique_ptr<std::string> folder_;
   std::unique_ptr<std::vector<std::string>> arguments_;
@@ -38,20 +38,20 @@ struct SpawnSurroundings {
   char* const* environment = nullptr;        ///< null-terminated
   int standardInput = -1;                    ///< descriptor above 2
   int standardOutput = -1;                   ///< descriptor above 2; standard error as well
-  std::atomic<pid_t>* groupEntry = nullptr;  ///< takes the group before the command can start a process of its own
+  std::atomic<pid_t>* groupEntry = nullptr;  ///< receives the group before the command can start a process of its own
 };
 
 /// A process that was started, or why it was not.
 struct SpawnedProcess {
   pid_t id = -1;           ///< also its process group
   int pidfd = -1;          ///< close-on-exec
-  int error = 0;           ///< errno; 0 when it runs
-  std::string failedStep;  ///< what could not be done: "started", "entered its folder"
+  int error = 0;           ///< errno; 0 if it was started
+  std::string failedStep;  ///< what failed: "started", "entered its folder"
 };
 
 /// Starts the command in a process group of its own with default signal handling, no descriptor above 2, and SIGKILL on
-/// the death of this process. A file with a run bit is executed (by /bin/sh when it has no "#!" line), any other is
-/// given to /bin/sh.
+/// the death of this process. A file with an execute bit is executed (by /bin/sh if it has no "#!" line), any other is
+/// passed to /bin/sh.
 SpawnedProcess spawnProcess(const SpawnCommand& command, const SpawnSurroundings& surroundings);
 
 }  // namespace mirevo

@@ -9,7 +9,7 @@
 namespace mirevo::csv {
 namespace {
 
-/// The number of two digits, or one beyond 99 when either is no digit.
+/// The number of two digits, or one above 99 if either is not a digit.
 int twoDigits(const char* at) {
   const unsigned tens = static_cast<unsigned char>(at[0]) - unsigned{'0'};
   const unsigned ones = static_cast<unsigned char>(at[1]) - unsigned{'0'};
@@ -27,7 +27,7 @@ int countSeparators(const char* begin, const char* end, char separator, bool may
 
 const char* previousCell(const char* cell, char separator) {
   bool quoted = false;
-  --cell;  // onto the separator before this cell
+  --cell;  // to the separator before this cell
   while (quoted || cell[-1] != separator) {
     --cell;
     if (*cell == '"') quoted = !quoted;
@@ -65,7 +65,7 @@ std::optional<std::int64_t> DateScanner::scan(const char*& at, const char* end) 
   const char* const date = at;
   at += kDayLength;
   if (at == end || (*at != ' ' && *at != 'T')) return day;
-  if (*at == ' ' && (end - at < 2 || at[1] < '0' || at[1] > '9')) return day;  // a blank after the date, no time
+  if (*at == ' ' && (end - at < 2 || at[1] < '0' || at[1] > '9')) return day;  // a blank after the date, without a time
   if (end - date < kMinutesLength || date[13] != ':') return std::nullopt;
   const int hour = twoDigits(date + 11);
   const int minute = twoDigits(date + 14);

@@ -8,8 +8,7 @@
 
 #include "common/calendar.h"
 
-/// The cells of one CSV line, as ranges of characters. Quotes toggle: a separator between two of them separates
-/// nothing.
+/// The cells of one CSV line, as ranges of characters. A separator between quotes does not separate.
 namespace mirevo::csv {
 
 inline bool isBlank(char c) {
@@ -36,22 +35,22 @@ inline const char* endOfCell(const char* cell, const char* end, char separator) 
   return cell;
 }
 
-/// Number of separators between `begin` and `end`; without quotes the faster count.
+/// Number of separators between `begin` and `end`; faster if there can be no quotes.
 int countSeparators(const char* begin, const char* end, char separator, bool mayHaveQuotes);
 
-/// The beginning of the cell before the one that begins at `cell`, which must not be the line's first.
+/// The beginning of the previous cell; `cell` must not begin the first cell of the line.
 const char* previousCell(const char* cell, char separator);
 
-/// A cell's meaning: without blanks around it and without the quotes around that.
+/// The content of a cell: without surrounding blanks, and then without surrounding quotes.
 std::string_view cellText(const char* begin, const char* end);
 
-/// The seconds (see secondNumber()) of dates as text. Remembers the last day, as one day has many rows.
+/// Reads dates as seconds (see secondNumber()). Caches the last day, as one day has many rows.
 class DateScanner final {
  public:
-  /// Reads `YYYY-MM-DD`, or that with ` HH:MM` or `THH:MM` and optional `:SS`, at `at` and moves `at` past it; nothing,
-  /// with `at` anywhere, when there is no valid date.
+  /// Reads `YYYY-MM-DD`, or that with ` HH:MM` or `THH:MM` and optional `:SS`, at `at` and moves `at` past it; empty,
+  /// with `at` undefined, when there is no valid date.
   std::optional<std::int64_t> scan(const char*& at, const char* end);
-  /// scan() of a whole cell: blanks around the date and quotes around that are allowed. `at` is left on what follows.
+  /// scan() of a whole cell: surrounding blanks and quotes are allowed. `at` is moved to what follows.
   std::optional<std::int64_t> scanCell(const char*& at, const char* end);
 
  private:
@@ -61,7 +60,8 @@ class DateScanner final {
   std::int64_t lastDaySecond_ = 0;
 };
 
-/// A value cell: a number, or NaN where it is empty, NaN or NA; nothing when it is neither or beyond 32-bit range.
+/// A value cell: a number, or NaN if it is empty, NaN or NA; empty for any other text and for numbers outside the
+/// 32-bit range.
 std::optional<float> parseCell(const char* begin, const char* end);
 
 }  // namespace mirevo::csv

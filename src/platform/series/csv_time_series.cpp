@@ -18,7 +18,8 @@ std::string_view viewOf(const char* begin, const char* end) {
   return {begin, static_cast<std::size_t>(end - begin)};
 }
 
-/// The separator that ends the first cell of the header row, the time column's name: a later one may stand in a name.
+/// The separator that ends the first cell of the header row, the name of the time column; other separators may occur in
+/// later names.
 std::optional<char> findSeparator(std::string_view header) {
   bool quoted = false;
   for (const char c : header) {
@@ -119,7 +120,7 @@ bool CsvTimeSeries::readRows(std::size_t position) {
   const char* const end = content_.data() + content_.size();
   const char* line = content_.data() + position;
   hasQuotes_ = std::memchr(line, '"', static_cast<std::size_t>(end - line)) != nullptr;
-  // The first row tells how many there will be; no row is shorter than a day and an empty cell.
+  // Estimates the number of rows from the length of the first; the shortest row is a date and an empty cell.
   constexpr std::size_t kShortestRow = 12;
   const std::size_t rowLength = std::max(kShortestRow, static_cast<std::size_t>(csv::endOfLine(line, end) - line) + 1);
   times_.reserve((content_.size() - position) / rowLength + 1);

@@ -14,16 +14,16 @@ namespace csv {
 class DateScanner;
 }
 
-/// A text table of series: `#` comments, a header row, one row a time step, columns separated by comma, semicolon or
-/// tab. The file is read in one go; open() reads the time axis and checks the shape of every row, getData() reads one
-/// column, so that columns that nobody asks for (and their text flags) cost nothing and break nothing.
+/// A text table of series: `#` comments, a header row, one row per time step, columns separated by comma, semicolon or
+/// tab. The file is read at once; open() reads the time axis and checks the number of cells in every row, getData()
+/// reads one column, so that unused columns cost nothing and may hold any text.
 class CsvTimeSeries final : public StoredTimeSeries {
  public:
   bool open(const std::string& fileName) override;
-  /// open() with the content at hand; `sourceName` is for messages.
+  /// open() for content in memory; `sourceName` is used in messages.
   bool parse(std::string sourceName, std::string content);
 
-  /// That of the `# missing =` comment, else NaN. Empty cells, NaN and NA are NaN among the values.
+  /// The value of the `# missing =` comment, else NaN. Empty cells, NaN and NA become NaN.
   std::optional<float> deleteValue() const override { return deleteValue_; }
 
  private:
@@ -36,16 +36,17 @@ class CsvTimeSeries final : public StoredTimeSeries {
   bool readRows(std::size_t position);
   bool readRow(const char* line, const char* lineEnd, csv::DateScanner& dates, std::int64_t& second);
   void moveToItem(int item);
-  /// Keeps "file:line:column: expected ..., found ..." for the place `at` in the content; returns false.
+  /// Stores "file:line:column: expected ..., found ..." for the position `at` in the content as the last error; returns
+  /// false.
   bool fail(const char* at, std::string_view expected, std::string_view found);
 
   std::string sourceName_;
   std::string content_;
   char separator_ = ',';
-  bool hasQuotes_ = false;  ///< anywhere among the rows; without them a cell ends at the next separator
+  bool hasQuotes_ = false;  ///< in any row; without quotes a cell ends at the next separator
   float deleteValue_ = std::numeric_limits<float>::quiet_NaN();
-  std::vector<std::size_t> cells_;  ///< one a row: where its cell of item cellsItem_ begins in the content
-  int cellsItem_ = 1;               ///< moves with getData(), so that items asked in order are found at once
+  std::vector<std::size_t> cells_;  ///< one per row: where the cell of item cellsItem_ begins in the content
+  int cellsItem_ = 1;               ///< moves with getData(), so that items read in order are found at once
 };
 
 }  // namespace mirevo

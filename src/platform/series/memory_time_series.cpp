@@ -10,7 +10,7 @@ namespace mirevo {
 
 MemoryTimeSeries::MemoryTimeSeries(DateRecord start, std::vector<double> times, std::vector<std::vector<float>> items,
                                    std::optional<float> deleteValue)
-    // No number equals NaN: with it only NaN itself marks a gap.
+    // No value equals NaN, so that without a delete value only NaN marks a gap.
     : deleteValue_(deleteValue.value_or(std::numeric_limits<float>::quiet_NaN())) {
   startSecond_ = secondNumber(start);
   times_ = std::move(times);

@@ -7,10 +7,10 @@
 
 namespace mirevo {
 
-/// A series that is given and not read: for tests, and for anything that computes a series itself.
+/// Series given in memory, for tests.
 class MemoryTimeSeries final : public StoredTimeSeries {
  public:
-  /// `times` in days since `start`, strictly increasing; `items[i]` holds the values of item i + 1, one a time.
+  /// `times` in days since `start`, strictly increasing; `items[i]` holds the values of item i + 1, one per time.
   MemoryTimeSeries(DateRecord start, std::vector<double> times, std::vector<std::vector<float>> items,
                    std::optional<float> deleteValue = std::nullopt);
 

@@ -15,13 +15,13 @@ constexpr std::uint64_t kDimensions = 10;
 constexpr std::uint64_t kVariables = 11;
 constexpr std::uint64_t kAttributes = 12;
 
-/// Walks through the header, whose numbers are big-endian, as the classic file format lays it out.
-/// Sizes are doubles: exact for every file there is, and without overflow for a damaged header.
+/// Reads the header of a file in a classic format, whose numbers are big-endian. Sizes are doubles: exact for every
+/// possible file, and without overflow for a damaged header.
 class ClassicHeader final {
  public:
   explicit ClassicHeader(const std::string& fileName) : file_(fileName, std::ios::binary) {}
 
-  /// The number of bytes that the file must have at least; nothing when that cannot be told.
+  /// The least number of bytes that the file must have; empty if it cannot be determined.
   std::optional<double> smallestSize() {
     if (number(3) != 0x434446) return std::nullopt;  // "CDF"
     const std::uint64_t version = number(1);
@@ -42,7 +42,7 @@ class ClassicHeader final {
 
  private:
   struct Variable {
-    double bytes;  ///< of a record, or of all of it
+    double bytes;  ///< of one record, or of the whole variable if it has none
     double begin;
     bool isRecord;
   };
@@ -52,7 +52,7 @@ class ClassicHeader final {
     for (int i = 0; i < bytes; ++i) value = value << 8U | (static_cast<std::uint64_t>(file_.get()) & 0xFFU);
     return value;
   }
-  /// Number of elements of a list that is there or, with two zeros, is not.
+  /// Number of elements of a list; an absent list is marked by two zeros.
   std::uint64_t listLength(std::uint64_t tag) {
     const bool isThere = number(4) == tag;
     const std::uint64_t length = number(countBytes_);
@@ -89,7 +89,7 @@ class ClassicHeader final {
     }
     skipAttributes();
     variable.bytes *= typeSize();
-    number(countBytes_);  // its size as the header has it, which does not hold for large ones
+    number(countBytes_);  // its size according to the header, which is wrong for large variables
     variable.begin = static_cast<double>(number(offsetBytes_));
     variables_.push_back(variable);
   }
@@ -111,7 +111,7 @@ class ClassicHeader final {
   std::ifstream file_;
   int countBytes_ = 4;
   int offsetBytes_ = 4;
-  std::vector<double> lengths_;  ///< of the dimensions; 0 of the unlimited one
+  std::vector<double> lengths_;  ///< of the dimensions; 0 for the unlimited one
   std::vector<Variable> variables_;
 };
 

@@ -5,8 +5,9 @@
 
 namespace mirevo {
 
-/// Why a file of the classic NetCDF formats is shorter than its header says: the library reads what is missing as
-/// zeros, so that a file which a model did not finish would count. Nothing for a whole file and for any other format.
+/// A message if a file in a classic NetCDF format is shorter than its header says; empty for a complete file and for
+/// any other format. The library reads the missing part as zeros, so that a file that a model did not finish would be
+/// taken for valid.
 std::optional<std::string> findCutOff(const std::string& fileName);
 
 }  // namespace mirevo

@@ -50,7 +50,7 @@ bool isNumeric(nc_type type) {
          type == NC_UINT || type == NC_INT64 || type == NC_UINT64 || type == NC_FLOAT || type == NC_DOUBLE;
 }
 
-/// A text attribute of either kind of text; empty when there is none.
+/// A text attribute, of type char or string; empty when there is none.
 std::string textAttribute(int file, int variable, const char* name) {
   nc_type type = NC_NAT;
   std::size_t length = 0;
@@ -80,7 +80,7 @@ std::optional<double> numberAttribute(int file, int variable, const char* name) 
   return numbers.front();
 }
 
-/// What the library fills unwritten values with: a model that stopped half-way leaves them. Bytes have no such value.
+/// The library's fill value for values that were not written, as by a model that stopped half-way. Bytes have none.
 std::optional<double> defaultFill(nc_type type) {
   switch (type) {
     case NC_SHORT:
@@ -104,7 +104,7 @@ std::optional<double> defaultFill(nc_type type) {
   }
 }
 
-/// How a variable's stored numbers become values.
+/// Converts the stored numbers of a variable to values.
 struct Unpacking {
   double fill = kNaN;     ///< NaN: none
   double missing = kNaN;  ///< NaN: none
@@ -202,7 +202,7 @@ bool NetcdfTimeSeries::readTimes(int timeVariable) {
   const auto earliest = static_cast<double>(secondNumber({0, 1, 1}));
   const auto latest = static_cast<double>(secondNumber({9999, 12, 31}));
   double first = 0.0;
-  double firstFraction = 0.0;  // of a second, after the start time
+  double firstFraction = 0.0;  // fraction of a second after startSecond_
   for (std::size_t step = 0; step < count; ++step) {
     const double seconds = unpack(stored[step]) * units->secondsPerUnit;
     const double absolute = static_cast<double>(units->originSecond) + seconds;
@@ -211,7 +211,7 @@ bool NetcdfTimeSeries::readTimes(int timeVariable) {
     }
     if (step == 0) {
       first = seconds;
-      // To the millisecond: a time in days need not be a whole second in 64 bits.
+      // Rounded to the millisecond: a time in days is not always a whole second in 64 bits.
       const double milliseconds = std::round(seconds * 1000.0);
       startSecond_ = units->originSecond + static_cast<std::int64_t>(std::floor(milliseconds / 1000.0));
       firstFraction = (milliseconds - std::floor(milliseconds / 1000.0) * 1000.0) / 1000.0;
@@ -249,7 +249,7 @@ bool NetcdfTimeSeries::findItems(int timeVariable) {
         stations = variable->lengths[p];
       }
     }
-    // A grid over time is no table of stations: it has no items.
+    // A grid over time is not a table of stations: it has no items.
     if (place.timePosition < 0 || longDimensions > 1) continue;
     if (items_.size() + stations > kMostItems) {
       return fail(fmt::format("expected at most {} items, found more at variable \"{}\"", kMostItems, variable->name));

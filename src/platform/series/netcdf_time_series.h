@@ -17,20 +17,20 @@ class NetcdfTimeSeries final : public StoredTimeSeries {
   ~NetcdfTimeSeries() override;
 
   bool open(const std::string& fileName) override;
-  /// NaN: every variable may have a marker of its own (`_FillValue`, `missing_value`, the library's default fill), so
-  /// all of them become NaN among the values.
+  /// NaN: every variable may have markers of its own (`_FillValue`, `missing_value`, the library's default fill value),
+  /// all of which are replaced by NaN.
   std::optional<float> deleteValue() const override;
 
  private:
   bool readItem(std::size_t place) override;
   const std::string& sourceName() const override { return fileName_; }
-  /// Where an item's values stand in the file.
+  /// Where the values of an item are in the file.
   struct Place {
     int variable = 0;
-    int timePosition = 0;  ///< which of the variable's dimensions is the time
+    int timePosition = 0;  ///< index of the time dimension of the variable
     int dimensionCount = 1;
-    int stationPosition = -1;  ///< which of them is the station; -1: none
-    std::size_t station = 0;   ///< index along it
+    int stationPosition = -1;  ///< index of the station dimension; -1: none
+    std::size_t station = 0;   ///< index along the station dimension
   };
 
   void close();
@@ -38,13 +38,13 @@ class NetcdfTimeSeries final : public StoredTimeSeries {
   bool readTimes(int timeVariable);
   bool findItems(int timeVariable);
   bool fail(const std::string& what);
-  /// Whether a call of the library succeeded; keeps "file: what: the library's message" if not.
+  /// Whether a call of the library succeeded; if not, stores "file: what: the library's message" as the last error.
   bool succeeded(int status, const std::string& what);
 
   int file_ = -1;  ///< the library's handle; -1: not open
   int timeDimension_ = -1;
   std::string fileName_;
-  std::vector<Place> places_;  ///< one an item
+  std::vector<Place> places_;  ///< one per item
 };
 
 }  // namespace mirevo

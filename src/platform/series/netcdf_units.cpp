@@ -11,7 +11,7 @@
 namespace mirevo {
 namespace {
 
-/// Seconds in a unit of time; nothing for another word. Months and years have no fixed length and are not taken.
+/// Seconds in a unit of time; empty for any other word. Months and years have no fixed length and are not accepted.
 std::optional<double> secondsOf(std::string_view unit) {
   constexpr std::array<std::pair<std::string_view, double>, 14> kUnits{{{"days", 86400.0},
                                                                         {"day", 86400.0},
@@ -33,7 +33,7 @@ std::optional<double> secondsOf(std::string_view unit) {
   return std::nullopt;
 }
 
-/// The `: minutes [: seconds [. zeros]]` after the hours.
+/// Takes `:minutes[:seconds[.zeros]]` after the hours, if present; false if it is malformed.
 bool takeMinutesAndSeconds(std::string_view& text, DateRecord& date) {
   if (!takeText(text, ":")) return true;
   const auto minute = takeNumber(text, 1, 2);
@@ -47,7 +47,7 @@ bool takeMinutesAndSeconds(std::string_view& text, DateRecord& date) {
   return true;
 }
 
-/// The whole of `text` as the date of an origin.
+/// The whole of `text` as a date.
 std::optional<DateRecord> parseOrigin(std::string_view text) {
   std::optional<DateRecord> date = takeDay(text, 1);
   if (!date) return std::nullopt;
@@ -66,8 +66,8 @@ std::optional<DateRecord> parseOrigin(std::string_view text) {
   return std::nullopt;
 }
 
-/// How many days later the Gregorian calendar has a date than the Julian one, in which every fourth year is a leap
-/// year: what is 1582-10-05 there is 1582-10-15 here.
+/// How many days the Julian calendar, in which every fourth year is a leap year, is behind the Gregorian one: Julian
+/// 1582-10-05 is Gregorian 1582-10-15.
 std::int64_t daysBehind(const DateRecord& date) {
   const int lastFebruary = date[date_field::kYear] - (date[date_field::kMonth] <= 2 ? 1 : 0);
   return lastFebruary < 0 ? -2 : lastFebruary / 100 - lastFebruary / 400 - 2;

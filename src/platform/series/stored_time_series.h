@@ -8,8 +8,8 @@
 
 namespace mirevo {
 
-/// What the kinds of series files have in common: a time axis and items in memory, which a kind's open() fills and its
-/// readItem() completes.
+/// What all series formats have in common: a time axis and items in memory, filled by open() and readItem() of the
+/// format.
 class StoredTimeSeries : public TimeSeriesObject {
  public:
   const std::string& lastError() const final { return lastError_; }
@@ -24,17 +24,17 @@ class StoredTimeSeries : public TimeSeriesObject {
  protected:
   struct Item {
     std::string name;
-    std::vector<float> values = {};  ///< one a time step; empty until getData()
+    std::vector<float> values = {};  ///< one per time step; empty until getData()
   };
 
-  /// Fills in the values of an item, given by its 0-based place; false, with lastError_ said and no value left, when
-  /// they cannot be read.
+  /// Reads the values of an item, given by its 0-based index; false, with lastError_ set and no values, when that
+  /// fails.
   virtual bool readItem(std::size_t place) = 0;
-  /// Whose items they are, for messages.
+  /// The name of the source, for messages.
   virtual const std::string& sourceName() const = 0;
 
   std::string lastError_;
-  std::int64_t startSecond_ = 0;  ///< of the first step, whole seconds
+  std::int64_t startSecond_ = 0;  ///< secondNumber() of the first step, whole seconds
   std::vector<double> times_;     ///< days since startSecond_
   std::vector<Item> items_;
 

@@ -19,9 +19,9 @@ std::unique_ptr<TimeSeriesObject> make() {
   return std::make_unique<Format>();
 }
 
-/// The kinds of series files. A further one needs its pair of files and a row here.
+/// The formats of series files. A further one needs a pair of files and a row here.
 struct SeriesFormat {
-  std::string_view endings;  ///< of file names, in lower case, a blank between two
+  std::string_view endings;  ///< of file names, in lower case, separated by blanks
   std::unique_ptr<TimeSeriesObject> (*make)();
 };
 constexpr SeriesFormat kFormats[] = {
@@ -29,8 +29,8 @@ constexpr SeriesFormat kFormats[] = {
     {".nc", make<NetcdfTimeSeries>},
 };
 
-/// Index of the first step not earlier than `days`, counting steps within half a millisecond as at `days`; the number
-/// of steps when there is none. Widens its search from `hint` in doubling strides.
+/// Index of the first step not earlier than `days`, with the tolerance kSameTimeDays; the number of steps when there is
+/// none. Widens its search from `hint` in doubling strides.
 std::size_t firstStepFrom(std::span<const double> times, double days, std::size_t hint) {
   const double from = days - kSameTimeDays;
   std::size_t low = std::min(hint, times.size());
@@ -53,7 +53,7 @@ std::size_t firstStepFrom(std::span<const double> times, double days, std::size_
   return static_cast<std::size_t>(std::lower_bound(first + low, first + high, from) - first);
 }
 
-/// The value of the item in the period that no other `precedes`.
+/// The value of the item in the period that no other value precedes according to `precedes`.
 template <typename Precedes>
 std::optional<float> extractValue(const TimeSeriesObject& series, int item, double start, double end,
                                   Precedes precedes) {

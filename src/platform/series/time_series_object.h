@@ -19,48 +19,48 @@ class TimeSeriesObject {
   TimeSeriesObject& operator=(const TimeSeriesObject&) = delete;
   virtual ~TimeSeriesObject() = default;
 
-  /// Reads the file. False when it cannot be opened or is no valid series file; lastError() then says where and why,
+  /// Reads the file. False when it cannot be opened or is not a valid series file; lastError() then says where and why,
   /// "sim.csv:17:1: expected a time later than 2001-01-31 00:00".
   virtual bool open(const std::string& fileName) = 0;
   virtual const std::string& lastError() const = 0;
 
-  /// Date and time of the first step; nothing when the file has no step.
+  /// Date and time of the first step; empty if the file has no steps.
   virtual std::optional<DateRecord> startTime() const = 0;
   virtual std::optional<float> deleteValue() const = 0;
   virtual int itemCount() const = 0;
   virtual std::string itemName(int item) const = 0;
 
-  /// Makes the item's values available; false (with lastError()) when the item's values cannot be read.
+  /// Makes the values of the item available; false (with lastError()) when they cannot be read.
   virtual bool getData(int item) = 0;
 
   virtual int timeStepCount() const = 0;
-  /// All step times at once, in days since the start time: shape timeStepCount().
+  /// All step times, in days since the start time; timeStepCount() entries.
   virtual std::span<const double> times() const = 0;
-  /// All values of an item after getData(): shape timeStepCount().
+  /// All values of an item, after getData(); timeStepCount() entries.
   virtual std::span<const float> values(int item) const = 0;
 };
 
-/// An object of the kind that the file name's ending asks for; nullptr when no kind reads such files. `reason` then
-/// names the known endings.
+/// An object of the class for the ending of the file name; nullptr for an unknown ending. `reason` then names the known
+/// ones.
 std::unique_ptr<TimeSeriesObject> createTimeSeriesObject(const std::string& fileName, std::string& reason);
 
-/// Two times of one axis closer than half a millisecond (in days) are the same time: far above the rounding of days in
-/// 64 bits over thousands of years, far below any time step.
+/// Half a millisecond, in days. Times that are closer are the same time: this is far above the rounding of days in 64
+/// bits over thousands of years and far below any time step.
 inline constexpr double kSameTimeDays = 0.5e-3 / 86400.0;
 
-/// Whether a value marks a gap: the delete value, or no number.
+/// Whether a value marks a gap: the delete value, or NaN.
 inline bool isMissing(float value, std::optional<float> deleteValue) {
   return value != value || (deleteValue && value == *deleteValue);
 }
 
-/// Value at a time (days since the object's start): that of the step there, else linear between its two neighbours,
-/// computed in 64 bits and rounded once to 32; nothing outside the axis or beside a missing neighbour. The item's data
-/// must be available. `hint` is a step (0-based) near which the search begins and where it ended: callers that walk
-/// along an axis pass the same variable again and find each value in constant time.
+/// The value at a time (days since the start of the series): that of a step at this time, else interpolated linearly
+/// between its two neighbours, in 64 bits and rounded once to 32; empty outside the time axis or next to a missing
+/// value. getData() must have been called. `hint` is the 0-based step near which the search begins, and is set to where
+/// it ends: callers that proceed along the axis pass the same variable again and find each value in constant time.
 std::optional<float> valueAt(const TimeSeriesObject& series, int item, double days, std::size_t& hint);
 std::optional<float> valueAt(const TimeSeriesObject& series, int item, double days);
 
-/// Largest and smallest value that is not missing with start <= t <= end; nothing when there is none.
+/// Largest and smallest value that is not missing with start <= t <= end; empty when there is none.
 std::optional<float> extractMaxValue(const TimeSeriesObject& series, int item, double start, double end);
 std::optional<float> extractMinValue(const TimeSeriesObject& series, int item, double start, double end);
 

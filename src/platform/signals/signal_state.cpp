@@ -28,7 +28,7 @@ EndingSignalsHeld::EndingSignalsHeld() {
   for (const int signalNumber : kEndingRequests) ::sigaddset(&held, signalNumber);
   ::sigprocmask(SIG_BLOCK, &held, &before_);
   if (signalState.heldSteps++ > 0 || !signalState.isEnding) return;
-  // Another thread ends the run, or has just handed that on to this one: no further step begins.
+  // Another thread ends the run, or has just passed that on to this one: no further step may begin.
   --signalState.heldSteps;
   ::sigprocmask(SIG_SETMASK, &before_, nullptr);
   for (;;) ::pause();

@@ -11,12 +11,12 @@ namespace mirevo {
 struct SignalState {
   std::atomic<int> terminationLogUnit{0};  ///< a descriptor; 0 or less: none
   std::atomic<int> runLogDescriptor{-1};
-  std::atomic<int> resultFileDescriptor{-1};   ///< as long as rows are written; -1 from the closing lines on
-  std::atomic<int> runRecordDescriptor{-1};    ///< while the record of the run has no ending
+  std::atomic<int> resultFileDescriptor{-1};   ///< while rows are written; -1 from the closing lines on
+  std::atomic<int> runRecordDescriptor{-1};    ///< until the end of the run is recorded
   std::atomic<int> messageFileDescriptor{-1};  ///< of the progress records
   std::atomic<int> heldSteps{0};               ///< number of EndingSignalsHeld objects
   std::atomic<bool> isEnding{false};           ///< a handler has begun to end the run
-  /// Ends the model's processes; async-signal-safe.
+  /// Ends the model processes; async-signal-safe.
   std::atomic<void (*)()> haltProcesses{nullptr};
   std::atomic<bool> showsMessageBox{true};        ///< BUILDMODE is not "NIGHT"
   std::atomic<bool> writesStandardOutput{false};  ///< "NIGHT", and `G48` names no front end
@@ -30,11 +30,11 @@ inline SignalState signalState;
 /// ignored.
 void writeLineFromSignal(int descriptor, std::string_view text, std::string_view prefix = {}) noexcept;
 
-/// The signals that request the run's end; the others that are handled report a crash.
+/// The signals that request the end of the run; the other handled signals report a crash.
 inline constexpr std::array kEndingRequests{SIGINT, SIGTERM, SIGHUP, SIGQUIT, SIGXCPU};
 
-/// While such an object exists, signals that request the run's end wait, so that no step is interrupted half-way and no
-/// file is left incomplete. For the main thread; the objects may be nested.
+/// Holds back signals that request the end of the run while it exists, so that no step is interrupted half-way and no
+/// file is left incomplete. For the main thread; objects may be nested.
 class EndingSignalsHeld final {
  public:
   EndingSignalsHeld();

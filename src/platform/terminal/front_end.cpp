@@ -12,7 +12,7 @@ namespace {
 
 constexpr int kPatienceMilliseconds = 1000;
 
-/// ECMA-48: red, yellow, or none.
+/// The ECMA-48 control sequence for red or yellow, or none.
 std::string_view colourOf(MessageType type) {
   if (type == MessageType::error) return "\x1b[31m";
   return type == MessageType::warning ? "\x1b[33m" : "";

@@ -12,11 +12,11 @@ enum class MessageType { error = 16, warning = 48, information = 64 };
 enum class MessageResult { notShown = 0, ok = 1 };
 
 /// Shows a message to the user: "title: text" on standard error, on a terminal with the title in the colour of the
-/// message's type. No box is opened, whatever `G48` is (under `//qmon` standard error is the viewer's), so nobody has
-/// to answer. A terminal or pipe that takes nothing is waited for one second; then the message is lost.
+/// message's type. No box is opened, whatever the value of `G48`, so nobody has to answer. A message that a terminal or
+/// pipe does not accept within a second is lost.
 MessageResult showMessage(std::string_view text, std::string_view title = {}, MessageType type = MessageType::error);
 
-/// Whether the program runs without a user: BUILDMODE is "NIGHT".
+/// Whether nobody is watching: BUILDMODE is "NIGHT".
 bool isUnattended();
 
 /// The name of the program's file without folder and ending: the title of messages.

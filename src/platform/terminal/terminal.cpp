@@ -105,7 +105,7 @@ SignalQueue::SignalQueue() {
   block();
   const sigset_t signals = queuedSignals();
   descriptor_ = ::signalfd(-1, &signals, SFD_CLOEXEC | SFD_NONBLOCK);
-  ::signal(SIGPIPE, SIG_IGN);  // an output that nobody reads any more is noticed when it is written to
+  ::signal(SIGPIPE, SIG_IGN);  // writing to an output that nobody reads any more fails instead
 }
 
 sigset_t SignalQueue::block() {

@@ -6,11 +6,11 @@
 
 namespace mirevo {
 
-/// Whether standard input and output are one terminal on which whole screens can be drawn: TERM is set and not "dumb",
-/// and this process is in its foreground.
+/// Whether standard input and output are the same terminal, on which whole screens can be drawn: TERM is set and not
+/// "dumb", and this process is in the foreground.
 bool hasScreenTerminal();
 
-/// Whether standard input is a terminal that may be read: this process is in its foreground.
+/// Whether standard input is a terminal that may be read: this process is in the foreground.
 bool hasKeyboard();
 
 /// Whether the environment asks for a locale with UTF-8 characters (LC_ALL, LC_CTYPE, LANG, in this order).
@@ -19,12 +19,12 @@ bool wantsUtf8();
 /// Whether to write in colour to a terminal: NO_COLOR is unset or empty, and TERM is set and not "dumb".
 bool wantsColour();
 
-/// Writes the whole text to standard output; false when nobody reads there any more.
+/// Writes the whole text to standard output; false when its reader has gone.
 bool writeToOutput(std::string_view text);
 
-/// The terminal while it shows whole screens. Every key is read at once and without echo, also Ctrl-C and Ctrl-Z; what
-/// the terminal showed before is restored at the end. It is drawn with the control sequences of ECMA-48 and those of
-/// the alternate screen, which all terminal programs in use understand, so that no terminal library is needed.
+/// A terminal in full-screen mode. Keys are read at once and without echo, including Ctrl-C and Ctrl-Z; the previous
+/// content is restored at the end. Screens are drawn with the control sequences of ECMA-48 and those of the alternate
+/// screen, which all terminals in use understand, so that no terminal library is needed.
 class TerminalScreen final {
  public:
   TerminalScreen();
@@ -39,7 +39,7 @@ class TerminalScreen final {
     int columns = 80;
     int rows = 24;
   };
-  /// 80 x 24 where the terminal does not say.
+  /// 80 x 24 if the terminal does not say.
   static Size size();
 
  private:

@@ -1,5 +1,5 @@
-// node bundle.mjs <node_modules> <output>: bundles main.ts and report.css with the packages they import, and puts both into
-// report.html. What is left to fill in is the run's data and the title.
+// node bundle.mjs <node_modules> <output>: bundles main.ts and report.css with the packages that they import, and puts
+// both into report.html. The program later fills in title and data of a run.
 import { mkdirSync, readFileSync, writeFileSync } from 'node:fs';
 import { createRequire } from 'node:module';
 import { dirname, join, resolve } from 'node:path';
@@ -26,10 +26,10 @@ async function bundle(entry) {
   return result.outputFiles[0].text.trim();
 }
 
-// What would end the element that holds the text; in scripts it can only stand in strings and comments.
+// Escapes what would end the enclosing element; in scripts it can only occur in strings and comments.
 const inScript = (text) => text.replaceAll('</script', '<\\/script').replaceAll('<!--', '<\\!--');
 
-// What the licences of the bundled packages ask to go along with every copy.
+// The licence texts that must accompany every copy of the bundled packages.
 const kLicences = ['echarts/LICENSE', 'echarts/NOTICE', 'zrender/LICENSE', 'tslib/LICENSE.txt'];
 const licences = kLicences.map((file) => `${file}\n\n${readFileSync(join(packages, file), 'utf8')}`).join('\n\n');
 

@@ -1,5 +1,5 @@
-// A chart with its title, its switches and its values as a table. Charts are drawn when they come into view, and the others
-// one by one while the page has nothing else to do, so that a long report opens at once.
+// A chart with its title, its switches and its values as a table. Charts are drawn when they come into view, the others
+// one by one while the page is idle, so that a long report opens at once.
 import { BarChart, CustomChart, HeatmapChart, LineChart, ParallelChart, ScatterChart } from 'echarts/charts';
 import {
   DatasetComponent, DataZoomComponent, GridComponent, LegendComponent, MarkAreaComponent, MarkLineComponent, ParallelComponent,
@@ -23,7 +23,7 @@ export type Option = EChartsCoreOption;
 export interface Switch {
   key: string;
   label: string;
-  on?: boolean; // at the beginning
+  on?: boolean; // initially
   hint?: string;
 }
 
@@ -48,8 +48,8 @@ export interface ChartPlan {
 export type Chart = HTMLElement & { redraw: () => void };
 
 const kRowsShown = 200;
-const kPaperWidth = 680; // CSS pixels: A4 less its margins
-const kDrawnUnasked = 80; // the others wait until they are looked at or printed
+const kPaperWidth = 680; // CSS pixels: A4 without its margins
+const kDrawnUnasked = 80; // the others are drawn only when they are viewed or printed
 const drawers = new Map<Element, Drawn>();
 const coming = new IntersectionObserver((entries) => {
   for (const entry of entries) if (entry.isIntersecting) drawers.get(entry.target)?.draw();
@@ -155,7 +155,7 @@ export function tip(headline: string, lines: [string, string][] = []): HTMLEleme
     ...lines.map(([name, value]) => make('div', {}, make('span', {}, name), make('b', {}, value))));
 }
 
-// Dragging selects what to zoom to; the wheel zooms only with Ctrl, as it scrolls the page otherwise.
+// Dragging selects a span to zoom to; the wheel zooms only with Ctrl, since otherwise it scrolls the page.
 const inside = { type: 'inside', zoomOnMouseWheel: 'ctrl', moveOnMouseMove: false, moveOnMouseWheel: false };
 
 /** Zoom along a time axis, with a slider below the chart. `filterMode` 'filter' lets the other axis follow what is shown. */
@@ -184,7 +184,7 @@ function zooming(zoom: ChartPlan['zoom'], option: Option): Option {
   };
 }
 
-// One style for all: the library sets the larger units in bold.
+// The same style for all units; by default the library sets the larger ones in bold.
 const kTimeLabels = { year: '{yyyy}', month: '{MMM}', day: '{d} {MMM}', hour: '{HH}:{mm}', minute: '{HH}:{mm}', second: '{HH}:{mm}:{ss}' };
 
 export interface AxisPlan {
@@ -264,7 +264,7 @@ export function chart(plan: ChartPlan): Chart {
   });
 }
 
-// The table is made when it is opened: most never are.
+// The table is made when it is opened; most never are.
 function valuesTable(title: string, values: () => Values): HTMLElement {
   const details = make('details', {}, make('summary', {}, 'Values'));
   details.addEventListener('toggle', () => {

@@ -1,11 +1,11 @@
-// What the program writes into the page. Numbers that are missing, not a number or infinite are null. Everything that a run
-// does not have is absent or empty: the page shows a section only for what exists.
+// The data that the program writes into the page. Missing, NaN and infinite numbers are null. What a run does not have
+// is absent or empty: the page shows sections only for what exists.
 
 export type Maybe = number | null;
 
 export interface Run {
   title: string;
-  setup: string; // file name without its folder
+  setup: string; // file name without the folder
   setupName: string;
   task: 'scenarios' | 'sensitivity' | 'optimisation' | 'uncertainty';
   taskName: string;
@@ -29,7 +29,7 @@ export interface Run {
 export interface Parameter {
   name: string;
   comment?: string | null;
-  equation?: string | null; // of a dependent one
+  equation?: string | null; // for a dependent parameter
   lower: Maybe;
   upper: Maybe;
   start: Maybe;
@@ -67,7 +67,7 @@ export interface Evaluations {
   numbers: number[];
   ok: number[]; // 1: model values obtained, 0: failed
   aggregate: Maybe[];
-  parameters: Maybe[][]; // one column a variable parameter
+  parameters: Maybe[][]; // one column per variable parameter
   objectives: Maybe[][];
   measures: Maybe[][];
 }
@@ -109,7 +109,7 @@ export interface Series extends Times {
   best?: Maybe[];
   bestNumber?: number | null;
   period?: [number, number] | null;
-  thinned?: boolean; // reduced to the extremes of short spans; figures and `flowDuration` are of all values
+  thinned?: boolean; // reduced to the extremes of short spans; figures and `flowDuration` are computed from all values
   flowDuration?: FlowDuration;
   figures?: { initial?: Figures | null; best?: Figures | null };
 }
@@ -138,7 +138,7 @@ export interface Covariance {
 export interface Sensitivity {
   parameters: string[];
   outputs: string[];
-  derivatives: Maybe[][]; // one row a parameter, one column an output
+  derivatives: Maybe[][]; // one row per parameter, one column per output
   dimensionless: Maybe[][];
   composite: Maybe[];
   ranking: string[];

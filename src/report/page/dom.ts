@@ -1,4 +1,4 @@
-// Elements made from text only: whatever a name holds is shown as it is and never read as HTML.
+// Elements made from text only: names are shown literally and never interpreted as HTML.
 
 type Child = Node | string | null | undefined | false;
 type Attributes = Record<string, string | number | boolean | null | undefined | ((event: Event) => void)>;

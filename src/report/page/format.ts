@@ -1,4 +1,4 @@
-// Numbers and times as the whole page writes them, whatever the language of the browser.
+// The format of numbers and times on the page, independent of the browser's language.
 import type { Maybe } from './data';
 
 export const kMissing = '\u2013';

@@ -1,5 +1,5 @@
-// Colours of the charts. Okabe and Ito (2008), told apart by the colour-blind; between light and dark only what would be lost
-// against the ground changes. Lines differ in dash or width as well.
+// Colours of the charts. Okabe and Ito (2008), distinguishable for the colour-blind; between light and dark only those
+// change that would be hard to see against the background. Lines also differ in dash or width.
 
 export interface Look {
   ink: string;

@@ -1,4 +1,4 @@
-// What the page derives from the data for drawing. What is told as a figure comes with the data.
+// What the page derives from the data for drawing. Figures that it states are in the data.
 import type { Maybe, Parameter } from './data';
 
 export function finite(values: readonly Maybe[]): number[] {
@@ -55,7 +55,7 @@ export function correlation(a: readonly Maybe[], b: readonly Maybe[], places: re
     aa += da * da;
     bb += db * db;
   }
-  // What rounding leaves of a column of equal values is no variation.
+  // Variation due to rounding alone does not count.
   const varies = (squares: number, mean: number) => squares > used.length * (1e-12 * Math.abs(mean)) ** 2;
   return varies(aa, meanA) && varies(bb, meanB) ? ab / Math.sqrt(aa * bb) : null;
 }

@@ -8,7 +8,7 @@
 namespace mirevo {
 namespace {
 
-/// What the setup has, as the user knows it; the absolute path stands in the detail.
+/// The file name as written in the setup; the absolute path is in the detail.
 std::string shown(const std::string& path, std::string_view keyword, const SetupSection& section) {
   const std::string written = section.written(keyword);
   return written.empty() ? path : written;

@@ -7,12 +7,12 @@
 
 namespace mirevo {
 
-/// A file that must exist, `path` being what the keyword's value stands for.
+/// Throws FatalError unless the file `path`, named by the keyword, exists.
 void validateFileExists(const std::string& path, std::string_view keyword, const SetupSection& section);
-/// A file that must be readable, for the given text before its name.
+/// Throws FatalError with `message` and the name of the file unless it can be read.
 void validateFileOpens(const std::string& path, std::string_view keyword, const SetupSection& section,
                        std::string_view message = "Error: Unable to open ");
-/// A file of the model, which lies in the base folder or below it.
+/// Throws FatalError unless the file is in the base folder or below it.
 void validateInBaseFolder(const std::string& path, const std::string& baseFolder, std::string_view keyword,
                           const SetupSection& section);
 

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <filesystem>
+#include <span>
 #include <utility>
 
 #include <fmt/core.h>
@@ -13,16 +14,7 @@
 namespace mirevo {
 namespace {
 
-KdxDocument parsed(const std::string& fileName, std::string_view text) {
-  auto result = parseKdx(fileName, text);
-  if (const auto* error = std::get_if<KdxSyntaxError>(&result)) {
-    fatalError("Error: Unable to open " + fileName,
-               fmt::format("{}:{}:{}: {}", fileName, error->position.line, error->position.column, error->message));
-  }
-  return std::get<KdxDocument>(std::move(result));
-}
-
-/// What a missing name may have been misspelt as: the nearest of the names that are there and mean nothing.
+/// A suggestion for a missing name: the nearest of the unknown names in the section.
 std::string didYouMean(std::string_view missing, const std::vector<std::string>& unknown) {
   const auto nearest = nearestName(missing, unknown);
   return nearest ? fmt::format("; found {}, did you mean {}?", quotedForMessage(*nearest), quotedForMessage(missing))
@@ -33,11 +25,31 @@ std::string inside(std::string_view path, std::string_view name) {
   return path.empty() ? std::string(name) : fmt::format("{}/{}", path, name);
 }
 
+/// What the keyword accepts, if a text without quotes was written for a coded value.
+std::string wantedInstead(const KdxUnquotedText& found, const SetupSchema& schema) {
+  std::string pattern;
+  for (const std::string& name : std::span(found.sections).subspan(1)) pattern = inside(pattern, itemPattern(name));
+  const KeywordRow* row = found.sections.front() == kSetupTarget ? schema.findKeyword(pattern, found.keyword) : nullptr;
+  if (row == nullptr || row->type != KeywordType::code) return {};
+  const std::span<const CodeName> codes = row->facts.codes;
+  return fmt::format("; {} takes {}{}", row->name(), wantedCode(codes), nearestCode(codes, found.text));
+}
+
+KdxDocument parsed(const std::string& fileName, std::string_view text, const SetupSchema& schema) {
+  auto result = parseKdx(fileName, text);
+  if (const auto* error = std::get_if<KdxSyntaxError>(&result)) {
+    fatalError("Error: Unable to open " + fileName,
+               fmt::format("{}:{}:{}: {}{}", fileName, error->position.line, error->position.column, error->message,
+                           error->unquoted ? wantedInstead(*error->unquoted, schema) : ""));
+  }
+  return std::get<KdxDocument>(std::move(result));
+}
+
 }  // namespace
 
 SetupFile::SetupFile(const std::string& fileName, std::string folder, std::string_view text, const SetupSchema& schema,
                      RunLog& log)
-    : document_(parsed(fileName, text)), folder_(std::move(folder)), schema_(schema), log_(log) {}
+    : document_(parsed(fileName, text, schema)), folder_(std::move(folder)), schema_(schema), log_(log) {}
 
 SetupSection SetupFile::target() {
   const SetupSection root(*this, document_.root, "", "");
@@ -46,7 +58,7 @@ SetupSection SetupFile::target() {
 }
 
 std::string SetupFile::location(KdxPosition position) const {
-  if (position.line == 0) return document_.sourceName;  // the file as a whole
+  if (position.line == 0) return document_.sourceName;  // the position is the whole file
   return fmt::format("{}:{}:{}", document_.sourceName, position.line, position.column);
 }
 
@@ -150,7 +162,7 @@ void SetupSection::checkRange(const KeywordRow& row, const BoundSection& section
   const SetupValue value = convert(row, *keyword);
   const auto* integer = std::get_if<std::int32_t>(&value);
   const auto* real = std::get_if<double>(&value);
-  if (integer == nullptr && real == nullptr) return;  // a code's name
+  if (integer == nullptr && real == nullptr) return;  // the name of a code
   const double number = integer != nullptr ? *integer : *real;
   if (row.facts.range.contains(number)) return;
   std::string message(row.facts.refusal);
@@ -169,7 +181,7 @@ std::size_t SetupSection::readCount(std::string_view itemPrefix) const {
   }
   const KdxKeyword* keyword = node_->keyword(row.name());
   if (keyword == nullptr) {
-    if (present > 0) refuseMissing(row);  // items that would be left out without a word
+    if (present > 0) refuseMissing(row);  // else the items would be ignored silently
     echo(row, SetupValue(std::int32_t{0}), true);
     return 0;
   }
@@ -215,7 +227,7 @@ std::string SetupSection::written(std::string_view keyword) const {
   return text == nullptr ? std::string{} : std::string(trimTrailing(*text));
 }
 
-/// Of the keyword's first value; of the section where the keyword is absent.
+/// The location of the keyword's first value, or of the section if the keyword is absent.
 std::string SetupSection::location(std::string_view keyword) const {
   const KdxKeyword* found = node_->keyword(keyword);
   return file_->location(found == nullptr ? node_->position() : found->values.front().position);

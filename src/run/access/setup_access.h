@@ -14,24 +14,24 @@ namespace mirevo {
 
 class SetupSection;
 
-/// A setting that bears on the results, as the setup has it.
+/// A setting that affects the results, as written in the setup.
 struct ResultSetting {
   std::string section;  ///< names below the target, `/` between them
   std::string keyword;
-  std::string value;  ///< that of a coded keyword by its number, where it has one; a file's relative to the setup
+  std::string value;  ///< that of a coded keyword is its number, if it has one; file names are relative to the setup
   bool isDefault = false;
 };
 
-/// A parsed setup file and the log that everything read from it is echoed to.
+/// A parsed setup file and the log to which everything read from it is echoed.
 class SetupFile final {
  public:
-  /// `fileName` is the name that messages show, `folder` the absolute folder against which file names are resolved.
-  /// Throws FatalError with "Error: Unable to open " and the name for a text that is not KDX. `schema` and `log` must
-  /// outlive this.
+  /// `fileName` is the name in messages, `folder` the absolute folder to which file names are relative. Throws
+  /// FatalError with "Error: Unable to open " and the name if `text` is not valid KDX. `schema` and `log` must outlive
+  /// the object.
   SetupFile(const std::string& fileName, std::string folder, std::string_view text, const SetupSchema& schema,
             RunLog& log);
 
-  /// The target MIREVO_PARAMETERS. Sections of it may refer to this object, which must outlive them.
+  /// The target MIREVO_PARAMETERS. This object must outlive its sections.
   SetupSection target();
 
   const KdxDocument& document() const { return document_; }
@@ -39,13 +39,13 @@ class SetupFile final {
   RunLog& log() { return log_; }
   /// "setup.kdx:14:9"
   std::string location(KdxPosition position) const;
-  /// Absolute and normal form of a file name of the setup; blank stays blank.
+  /// The absolute path, in normal form, of a file named in the setup; a blank name stays blank.
   std::string resolve(std::string_view fileName) const;
-  /// The inverse of resolve() for a file in or below the setup's folder, so that the folder can be moved; others as
-  /// they are.
+  /// The inverse of resolve() for a file in or below the setup's folder, so that the folder can be moved; other paths
+  /// are unchanged.
   std::string relative(const std::string& path) const;
 
-  /// Every setting that bears on the results, in reading order.
+  /// Every setting that affects the results, in reading order.
   std::vector<ResultSetting>& resultSettings() { return resultSettings_; }
 
  private:
@@ -56,8 +56,8 @@ class SetupFile final {
   std::vector<ResultSetting> resultSettings_;
 };
 
-/// An open section of the setup: reads its keywords as their rows have them, echoes them, checks them, and knows where
-/// each is in the file, so that whatever is wrong with a value is reported with its location.
+/// An open section of the setup: reads its keywords as their rows say, echoes and checks them, and knows their
+/// positions in the file, so that a wrong value is reported with its location.
 class SetupSection final {
  public:
   SetupSection(SetupFile& file, const KdxSection& node, std::string path, std::string pattern);
@@ -68,7 +68,7 @@ class SetupSection final {
   /// `PARAMETER_12` for the prefix `PARAMETER_`.
   SetupSection openItem(std::string_view prefix, std::size_t number) const;
 
-  /// The section's name in the log, for a section that is returned to after others.
+  /// Writes the section's name to the log, for a section of which more is read after other sections.
   void echoName() const;
 
   /// Reads every keyword into its field, then checks each value against its row. Throws FatalError with "Error: Unable
@@ -82,11 +82,11 @@ class SetupSection final {
   void take(const BoundSection& section) const;
   void check(const BoundSection& section) const;
 
-  /// Reads the count of a list whose items' names begin with `itemPrefix`.
+  /// Reads the count of a list whose item names begin with `itemPrefix`.
   std::size_t readCount(std::string_view itemPrefix) const;
 
-  /// Reads a list's count and its items: `items` grows by one for each, which `section` fills, and `readItem(section,
-  /// item)` reads what is inside it.
+  /// Reads a list's count and its items: for each, an element is appended to `items` and filled from the keywords of
+  /// `section`; `readItem(section, item)` then reads the sections inside the item.
   template <class Item, class ReadItem>
   void readItems(std::string_view prefix, const SettingSection<Item>& section, std::vector<Item>& items,
                  ReadItem readItem) const {
@@ -106,10 +106,10 @@ class SetupSection final {
     if (items.empty()) refuse(emptyMessage, kItemCountKeyword, "expected 1 or more, found 0");
   }
 
-  /// Ends the run with `message`; `explanation` follows the keyword's location.
+  /// Throws FatalError with `message`; `explanation` follows the keyword's location.
   [[noreturn]] void refuse(std::string_view message, std::string_view keyword, std::string_view explanation) const;
   [[noreturn]] void refuse(const SettingRefusal& refusal) const;
-  /// Refuses unless there is nothing to refuse.
+  /// Refuses if there is a refusal.
   void require(const std::optional<SettingRefusal>& refusal) const {
     if (refusal) refuse(*refusal);
   }
@@ -121,7 +121,7 @@ class SetupSection final {
   /// The name without its path.
   std::string name() const;
   const std::string& path() const { return path_; }
-  /// The keyword's text as the setup has it, without trailing blanks; empty when it is absent.
+  /// The keyword's text as written in the setup, without trailing blanks; empty if it is absent.
   std::string written(std::string_view keyword) const;
 
  private:
@@ -138,7 +138,7 @@ class SetupSection final {
   SetupFile* file_;
   const KdxSection* node_;
   std::string path_;     ///< names below the target, `/` between them
-  std::string pattern_;  ///< the same as the schema has it
+  std::string pattern_;  ///< the same with item numbers as `n`, as in the schema
 };
 
 }  // namespace mirevo

@@ -18,9 +18,9 @@ class SetupSchema final {
   explicit SetupSchema(std::vector<const SectionRow*> sections);
 
   const std::vector<const SectionRow*>& sections() const { return sections_; }
-  /// nullptr for a path that the setup does not know; item numbers as `n`.
+  /// The section with this path, with item numbers as `n`; nullptr for an unknown path.
   const SectionRow* findSection(std::string_view path) const;
-  /// nullptr for a keyword that the section does not know.
+  /// The row of a keyword; nullptr if the section has no such keyword.
   const KeywordRow* findKeyword(std::string_view section, std::string_view name) const;
   /// The names of the sections directly inside `path` (empty: of the target), item numbers as `n`.
   std::vector<std::string> sectionNamesInside(std::string_view path) const;
@@ -30,7 +30,7 @@ class SetupSchema final {
   std::unordered_map<std::string_view, const SectionRow*> byPath_;
 };
 
-/// The name of an item section without its number, `PARAMETER_n` for `PARAMETER_12`; other names as they are.
+/// The name of an item section with `n` for its number, `PARAMETER_n` for `PARAMETER_12`; other names unchanged.
 std::string itemPattern(std::string_view name);
 
 }  // namespace mirevo

@@ -9,7 +9,7 @@
 #include "common/text.h"
 #include "platform/kdx/kdx_value.h"
 
-// GCC 12 under the sanitizers takes the alternatives of a variant inside a variant for uninitialised.
+// With the sanitizers GCC 12 wrongly reports alternatives of a variant inside a variant as uninitialised.
 #if defined(__GNUC__) && !defined(__clang__)
 #pragma GCC diagnostic ignored "-Wmaybe-uninitialized"
 #endif
@@ -45,7 +45,7 @@ std::string found(const KdxValue& value) {
     std::string operator()(double number) const {
       const std::string text = formatReal(number);
       const bool isWhole = text.find_first_not_of("-0123456789") == std::string::npos;
-      return isWhole && parseInteger(text) ? text + ".0" : text;  // tells 2.0 from 2 where that is the fault
+      return isWhole && parseInteger(text) ? text + ".0" : text;  // shows 2.0 as different from 2
     }
     std::string operator()(const std::string& text) const { return "the text " + quotedForMessage(text); }
     std::string operator()(const DateRecord& date) const { return "the date " + formatDate(date); }
@@ -100,27 +100,18 @@ Converted convertList(const KdxKeyword& keyword) {
   return SetupValue(std::move(list));
 }
 
-/// A number is taken whatever it is: what it means, and whether it means anything, is for the keyword to say.
+/// Accepts any number; the range of the keyword is checked later.
 Converted convertCode(std::span<const CodeName> codes, const KdxValue& value) {
   if (const auto* integer = std::get_if<std::int32_t>(&value.value)) return SetupValue(*integer);
   const auto* text = std::get_if<std::string>(&value.value);
-  if (text == nullptr) return mismatch(KeywordType::code, value);
-  const std::string_view name = trim(*text);
+  const std::string_view name = text == nullptr ? std::string_view{} : trim(*text);
   for (const CodeName& code : codes) {
     if (!equalIgnoringCase(code.name, name)) continue;
     if (code.code) return SetupValue(*code.code);
     return SetupValue(std::string(code.name));
   }
-  std::vector<std::string> names;
-  std::string known;
-  for (const CodeName& code : codes) {
-    names.emplace_back(code.name);
-    known += (known.empty() ? "'" : ", '") + names.back() + "'";
-  }
-  const auto nearest = nearestName(name, names);
-  return SetupValueError{value.position,
-                         fmt::format("expected {} or one of the names {}, found {}{}", wanted(KeywordType::code), known,
-                                     found(value), nearest ? fmt::format(", did you mean '{}'?", *nearest) : "")};
+  return SetupValueError{value.position, fmt::format("expected {}, found {}{}", wantedCode(codes), found(value),
+                                                     nearestCode(codes, name))};
 }
 
 Converted convertOne(const KeywordRow& row, const KdxValue& value) {
@@ -154,6 +145,19 @@ std::string inQuotes(std::string_view text) {
 }
 
 }  // namespace
+
+std::string wantedCode(std::span<const CodeName> codes) {
+  std::string names;
+  for (const CodeName& code : codes) names += fmt::format("{}'{}'", names.empty() ? "" : ", ", code.name);
+  return fmt::format("{} or one of the names {}", wanted(KeywordType::code), names);
+}
+
+std::string nearestCode(std::span<const CodeName> codes, std::string_view written) {
+  std::vector<std::string> names;
+  for (const CodeName& code : codes) names.emplace_back(code.name);
+  const auto nearest = nearestName(written, names);
+  return nearest ? fmt::format(", did you mean '{}'?", *nearest) : "";
+}
 
 Converted convertSetupValue(const KeywordRow& row, const KdxKeyword& keyword) {
   if (row.type == KeywordType::realList) return convertList(keyword);

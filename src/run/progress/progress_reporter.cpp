@@ -21,15 +21,15 @@ namespace {
 constexpr int kNowhere = -1;
 constexpr int kStandardOutput = 0;
 constexpr std::size_t kSpeedWindow = 100;  ///< evaluations
-/// For a pipe or terminal to take a record. One that took none in that time is not waited for until it takes one again,
-/// so that a reader who has stopped reading does not slow the run.
+/// Longest wait for a pipe or terminal to accept a record. After that there is no waiting until it accepts one again,
+/// so that a reader that has stopped reading does not slow down the run.
 constexpr int kPatienceMilliseconds = 1000;
 
 std::string baseNameOf(std::string_view runFileName) {
   for (const std::string_view ending : {run_files::kLog.extension, std::string_view(".inp")}) {
     if (!runFileName.ends_with(ending)) continue;
     runFileName.remove_suffix(ending.size());
-    break;  // what is left may be called "basin.inp"
+    break;  // only one ending: the rest may be "basin.inp"
   }
   return std::string(runFileName);
 }
@@ -61,7 +61,7 @@ std::string ProgressReporter::progressInit(std::string_view runFileName, std::st
   } else if (destination == "STDOUT") {
     messageUnit_ = kStandardOutput;
   } else {
-    // Without O_NONBLOCK the opening of a pipe would wait for its reader.
+    // Without O_NONBLOCK opening a pipe would wait for its reader.
     messageUnit_ =
         ::open(messageFile().c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_APPEND | O_CLOEXEC | O_NONBLOCK, 0666);
     if (messageUnit_ >= 0) {
@@ -89,7 +89,7 @@ void ProgressReporter::writeRecord(std::string_view kind, std::string_view text)
   record += '\n';
   if (isLineUnfinished_) record.insert(record.begin(), '\n');
   const int descriptor = messageUnit_ == kStandardOutput ? STDOUT_FILENO : messageUnit_;
-  // One write(2), so that a viewer that reads along never sees half a record of an ordinary disk file.
+  // One write(2), so that a viewer never sees half a record in a file on disk.
   const OutputResult result = writeWhole(descriptor, record, isReaderBusy_ ? 0 : kPatienceMilliseconds);
   isReaderBusy_ = result.error == EAGAIN;  // the record is lost
   if (result.taken > 0) isLineUnfinished_ = result.taken < record.size();

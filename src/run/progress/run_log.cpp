@@ -46,14 +46,14 @@ void RunLog::warning(std::string_view text) {
   line("Warning: " + std::string(text));
 }
 
-/// One write(2) a record, so that records of a signal handler never fall into the middle of one, and nothing is held
-/// back that a kill would lose.
+/// One write(2) per record, so that a signal handler never writes into the middle of one, and without buffering, so
+/// that a kill loses nothing.
 void RunLog::write(std::string_view record) {
   if (descriptor_ < 0) {
     pending_ += record;
     return;
   }
-  putBackIfRemoved(descriptor_, path_);  // where that fails the log goes on where nobody sees it, and so may the run
+  putBackIfRemoved(descriptor_, path_);  // if that fails, the log and the run go on all the same
   const int error = writeWhole(descriptor_, record).error;
   if (error != 0 && writeError_.empty()) writeError_ = std::strerror(error);
 }

@@ -5,7 +5,8 @@
 
 namespace mirevo {
 
-/// The run log, `<setup>.log`: written record by record, each on disk when the call returns.
+/// The run log, `<setup>.log`: each record has been passed to the system when the call returns, so that it survives a
+/// kill of the program.
 class RunLog final {
  public:
   RunLog() = default;
@@ -13,19 +14,20 @@ class RunLog final {
   RunLog(const RunLog&) = delete;
   RunLog& operator=(const RunLog&) = delete;
 
-  /// Creates the file anew; false with the system's reason when that fails. Lines written before are kept and come
-  /// first, so that what was said before the log could be opened is in it.
+  /// Creates the file, replacing an existing one; false with the system's reason when that fails. Lines written before
+  /// the call come first.
   bool open(const std::string& path, std::string& reason);
   void close();
 
-  /// One record; several lines where `text` has line ends.
+  /// Writes one record; several lines if `text` has line ends.
   void line(std::string_view text);
   void warning(std::string_view text);
 
-  /// For signal handlers: -1 while no file is open.
+  /// For signal handlers; -1 while no file is open.
   int descriptor() const { return descriptor_; }
   const std::string& path() const { return path_; }
-  /// What the system said when a record could first not be written ("No space left on device"); empty when all were.
+  /// The system's reason for the first record that could not be written ("No space left on device"); empty if all were
+  /// written.
   const std::string& writeError() const { return writeError_; }
 
  private:
@@ -33,7 +35,7 @@ class RunLog final {
 
   int descriptor_ = -1;
   std::string path_;
-  std::string pending_;  ///< what was said before the file was open
+  std::string pending_;  ///< lines written before the file was open
   std::string writeError_;
 };
 

@@ -21,7 +21,7 @@ std::string onOneLine(std::string text) {
   return text;
 }
 
-/// Goes on behind `content`, which is in the file then.
+/// Makes `content` the file's, to be continued.
 void continueWith(RecordFile& file, const std::string& path, const std::string& content) {
   std::string reason;
   if (readFileIfThere(path) != content && !replaceFile(path, content, reason)) {
@@ -43,24 +43,31 @@ std::string FailedRunFile::headLine() const {
   return fmt::format("# Failed evaluations of {}\n", setupName_);
 }
 
-std::map<int, EvaluationFailure> FailedRunFile::takeUp(const std::map<int, std::vector<double>>& parameterValues) {
-  const auto text = readFileIfThere(paths_.table);
-  // Another setup in this folder may have written it since: it stands there without a setup's name.
-  const auto told = readFileIfThere(paths_.forPeople);
-  if (!text || (told && !told->starts_with(headLine()))) keepEarlierFile(paths_.forPeople);
-  if (!text) return {};
-  std::map<int, EvaluationFailure> failures;
-  std::string rows = failureTableHead(tableHead_);
-  std::string records = headLine();
-  for (const FailureRow& row : readFailureTable(*text)) {
-    const auto values = parameterValues.find(row.number);
-    if (values == parameterValues.end() || !failures.emplace(row.number, row.failure).second) continue;
-    rows += failureRowText(row);
-    records += record(values->second, row);
+FailedRunFile::Earlier FailedRunFile::readEarlier(const std::set<int>& numbers) const {
+  Earlier earlier;
+  std::set<int> missing = numbers;
+  for (FailureRow& row : readFailureTable(readFileIfThere(paths_.table).value_or(""))) {
+    if (missing.erase(row.number) > 0) earlier.rows.push_back(std::move(row));
   }
-  continueWith(table_, paths_.table, rows);
+  earlier.unknown = missing.size();
+  for (const int number : missing) {
+    earlier.rows.push_back({number, {EvaluationFailure::Kind::notKnown, "failed in the earlier run", {}}});
+  }
+  return earlier;
+}
+
+void FailedRunFile::continueBehind(std::span<const FailureRow> rows,
+                                   const std::map<int, std::vector<double>>& parameterValues) {
+  std::string table = failureTableHead(tableHead_);
+  std::string records = headLine();
+  for (const FailureRow& row : rows) {
+    table += failureRowText(row);
+    records += record(parameterValues.at(row.number), row);
+  }
+  if (readFileIfThere(paths_.forPeople) != records) keepEarlierFile(paths_.forPeople);
+  if (rows.empty() && !readFileIfThere(paths_.table)) return;  // they appear with the first failure
+  continueWith(table_, paths_.table, table);
   continueWith(forPeople_, paths_.forPeople, records);
-  return failures;
 }
 
 void FailedRunFile::add(std::span<const double> parameterValues, const EvaluationResult& result) {

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <map>
 #include <set>
 #include <span>
@@ -14,11 +15,11 @@ namespace mirevo {
 /// Where the failures of a run are kept.
 struct FailedRunPaths {
   std::string forPeople;  ///< `calSimErr.dat`
-  std::string table;      ///< `<setup>_Failures.dat`
+  std::string table;      ///< `<setup>_Failures.dat` or, of the task, its like
 };
 
-/// What is needed to find out why model runs failed: `calSimErr.dat` for a person, `<setup>_Failures.dat` for programs.
-/// They appear with the first failure, so that a run without failures leaves none.
+/// What is needed to find out why model runs failed: `calSimErr.dat` for a person, a table for programs. They appear
+/// with the first failure, so that a run without failures leaves none.
 class FailedRunFile final {
  public:
   /// `names` are those of the variable parameters; `setupName` says whose failures these are; `tableHead` stands over
@@ -28,11 +29,20 @@ class FailedRunFile final {
 
   const FailedRunPaths& paths() const { return paths_; }
 
-  /// Takes up the table that an interrupted run of the same setup has left: keeps the rows of the evaluations with
-  /// those numbers and goes on behind them. `parameterValues`: theirs, by number, model scale. The file for people is
-  /// made of the same. Returns why they failed, by number; nothing where there is no table. Throws FatalError when a
-  /// file cannot be written.
-  std::map<int, EvaluationFailure> takeUp(const std::map<int, std::vector<double>>& parameterValues);
+  /// What an interrupted run has left of its failures.
+  struct Earlier {
+    std::vector<FailureRow> rows;  ///< one per failed evaluation
+    std::size_t unknown = 0;       ///< those of which the table does not say why they failed; they are the last
+  };
+
+  /// Reads the table of an interrupted run for the evaluations with those numbers. Throws FatalError where there is one
+  /// that cannot be read.
+  Earlier readEarlier(const std::set<int>& numbers) const;
+
+  /// Continues both files behind those failures. `parameterValues`: of each, by number, model scale. A file for people
+  /// that holds anything else is kept under a numbered name: it may be of another task, or of another setup in this
+  /// folder. Throws FatalError.
+  void continueBehind(std::span<const FailureRow> rows, const std::map<int, std::vector<double>>& parameterValues);
 
   /// One failed evaluation; `parameterValues` on the model scale, one a name. Throws FatalError when it cannot be
   /// written.

@@ -18,7 +18,7 @@ class FailureSummary final {
   };
 
   void add(int number, const EvaluationFailure& failure);
-  /// A line a kind of failure, the most frequent first, with the reason of the first evaluation that failed so.
+  /// One line per kind of failure, the most frequent first, with the reason of the first such evaluation.
   std::vector<std::string> lines() const;
   const std::map<EvaluationFailure::Kind, Count>& counts() const { return counts_; }
 

@@ -23,7 +23,7 @@ namespace {
   fatalError("Error: Unable to keep the earlier file " + path, reason);
 }
 
-/// A dot in a folder's name is its setup's and begins no ending.
+/// A dot in the name of a folder belongs to the setup's name and does not begin an ending.
 std::string firstFreeName(const std::string& path, bool isFolder) {
   const std::size_t nameStart = path.rfind('/') == std::string::npos ? 0 : path.rfind('/') + 1;
   const std::size_t dot = path.rfind('.');
@@ -33,7 +33,7 @@ std::string firstFreeName(const std::string& path, bool isFolder) {
     struct stat status {};
     if (::lstat(name.c_str(), &status) == 0) continue;
     if (errno == ENOENT) return name;
-    const char* reason = std::strerror(errno);  // something may be there, and would be lost
+    const char* reason = std::strerror(errno);  // a file may be there, which would be lost
     failToKeep(path, fmt::format("{}: {}", name, reason));
   }
 }
@@ -75,7 +75,7 @@ bool RecordFile::tryAppend(std::string_view record, std::string& reason) {
     reason = "the file is closed";
     return false;
   }
-  const EndingSignalsHeld held;  // a signal's closing line comes behind a whole record
+  const EndingSignalsHeld held;  // so that a signal's closing line follows a whole record
   if (!putBackIfRemoved(descriptor_, path_)) {
     reason = std::string("it was removed and cannot be put back: ") + std::strerror(errno);
     failed_ = true;
@@ -84,7 +84,7 @@ bool RecordFile::tryAppend(std::string_view record, std::string& reason) {
   if (const int error = writeWhole(descriptor_, record).error; error != 0) {
     reason = std::strerror(error);
     failed_ = true;
-    // What fitted of the record is no record: readers of the file would take it for one.
+    // Removes the part that was written: readers of the file would take it for a record.
     if (::ftruncate(descriptor_, size_) != 0 && errno != EINVAL) reason += ", and its last line is cut off";
     return false;
   }

@@ -6,8 +6,8 @@
 
 namespace mirevo {
 
-/// A text file that grows record by record: each record is on its way to disk when the call returns, and a record that
-/// does not fit on the disk leaves no torn half behind.
+/// A file that grows record by record: each record has been passed to the system when the call returns, and a record
+/// that does not fit on the disk leaves no part of itself behind.
 class RecordFile final {
  public:
   RecordFile() = default;
@@ -15,22 +15,23 @@ class RecordFile final {
   RecordFile(const RecordFile&) = delete;
   RecordFile& operator=(const RecordFile&) = delete;
 
-  /// Creates the file anew. Throws FatalError with the system's reason.
+  /// Creates the file, replacing an existing one. Throws FatalError with the system's reason.
   void open(const std::string& path);
 
-  /// Goes on behind what the file holds. Throws FatalError with the system's reason.
+  /// Opens the file to append to its content. Throws FatalError with the system's reason.
   void openToContinue(const std::string& path);
 
-  /// Appends `record` as it stands, line ends included. Throws FatalError with the system's reason, once: a file that
-  /// could not be written takes no further records.
+  /// Appends `record` unchanged, line ends included. Throws FatalError with the system's reason, once: after a failure
+  /// further records are dropped.
   void append(std::string_view record);
 
-  /// Like append(), for the end of a run that fails already: false, with the system's reason, instead of an error.
+  /// Like append(), for the end of a run that has failed already: returns false, with the system's reason, instead of
+  /// throwing.
   bool tryAppend(std::string_view record, std::string& reason);
 
-  /// Throws FatalError with the system's reason when what was written did not all arrive.
+  /// Throws FatalError with the system's reason if not everything written has reached the file.
   void close();
-  /// Like close(): false, with the system's reason, instead of an error.
+  /// Like close(), but returns false, with the system's reason, instead of throwing.
   bool tryClose(std::string& reason);
 
   bool isOpen() const { return descriptor_ >= 0; }
@@ -49,12 +50,13 @@ class RecordFile final {
 };
 
 /// Keeps an earlier run's file or folder from being overwritten: renames `path` to the first free of
-/// `<stem>.1<ending>`, `<stem>.2<ending>` ..., a folder `<name>.1`, and returns that name; empty when there is nothing
-/// to keep, or something that is neither (a device). Throws FatalError when it cannot be looked at or renamed.
+/// `<stem>.1<ending>`, `<stem>.2<ending>` ..., or of `<name>.1` ... for a folder, and returns that name; empty if there
+/// is nothing to keep, or neither a file nor a folder (a device). Throws FatalError when `path` cannot be examined or
+/// renamed.
 std::string keepEarlierFile(const std::string& path);
 
-/// Writes a text beside the results, whole. A file that holds it already, of a run that is walked through again, stays
-/// as it is; another one is kept under a numbered name. Throws FatalError.
+/// Writes a text to a file beside the results, as a whole. An existing file with the same content is left as it is; one
+/// with other content is kept under a numbered name. Throws FatalError.
 void writeBesideResults(const std::string& path, const std::string& text);
 
 }  // namespace mirevo

@@ -42,21 +42,14 @@ void requireSameSettings(const RestartSettings& then, const RestartSettings& now
   refuse(detail);
 }
 
-/// In the order of their numbers, each number once.
-void putInOrder(std::vector<ResultRow>& rows) {
-  std::stable_sort(rows.begin(), rows.end(), [](const auto& a, const auto& b) { return a.number < b.number; });
-  rows.erase(std::unique(rows.begin(), rows.end(), [](const auto& a, const auto& b) { return a.number == b.number; }),
-             rows.end());
-}
-
-/// The last evaluation before which none is missing.
+/// The number of the last evaluation before which none is missing.
 int lastWithoutGap(std::span<const ResultRow> rows) {
   int last = 0;
   while (last < std::ssize(rows) && rows[static_cast<std::size_t>(last)].number == last + 1) ++last;
   return last;
 }
 
-/// What the search does with an earlier one of a smaller budget.
+/// Applies what the search does with an earlier one that had a smaller budget.
 void raiseBudget(const Task& task, int earlierBudget, EarlierRun& run) {
   const auto raised = task.raisedBudget({earlierBudget, lastWithoutGap(run.rows), run.searches});
   if (!raised) return;
@@ -67,7 +60,7 @@ void raiseBudget(const Task& task, int earlierBudget, EarlierRun& run) {
   if (!raised->note.empty()) run.notes.push_back(raised->note);
 }
 
-/// The failed model runs behind which no evaluation succeeded: whatever stopped the run may be put right by now.
+/// Drops the failed evaluations after the last successful one: their cause may have been removed since.
 void dropFailuresAtEnd(EarlierRun& run) {
   const auto isOk = [](const ResultRow& row) { return row.ok; };
   const auto end = std::find_if(run.rows.rbegin(), run.rows.rend(), isOk).base();
@@ -80,14 +73,15 @@ void dropFailuresAtEnd(EarlierRun& run) {
 
 RestartFiles restartFiles(const std::string& filePrefix, const ResultFileNames& names) {
   return {runFilePath(filePrefix, names.results), runFilePath(filePrefix, names.restart),
-          runFilePath(filePrefix, names.simulatedValues)};
+          runFilePath(filePrefix, names.simulatedValues), runFilePath(filePrefix, names.record),
+          runFilePath(filePrefix, names.failures)};
 }
 
 std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunConfig& config,
                                          const ResultColumns& columns, std::optional<RunRecord> record) {
   const auto text = readFileIfThere(files.results);
   ResultTable table = readResultTable(text.value_or(""), columns);
-  // More than a beginning that was cut off: there may be days of work behind a header row that cannot be read.
+  // Not just a cut-off beginning: there may be days of work below a damaged header row.
   if (!table.hasHeader && table.unusableLines > 1) refuse(files.results + " has no header row that can be read");
   if (table.rows.empty() && table.rowsOfOtherColumns == 0) return std::nullopt;
   const RestartSettings then = readSettings(files.settings);
@@ -123,11 +117,7 @@ std::map<int, EarlierEvaluations::Record> earlierRecords(
     record.result.measureValues = row.measures;
     record.result.objectiveValues = row.objectives;
     if (!row.ok) {
-      const auto failure = failures.find(row.number);
-      record.result.failure =
-          failure != failures.end()
-              ? failure->second
-              : EvaluationFailure{EvaluationFailure::Kind::notKnown, "failed in the earlier run", {}};
+      record.result.failure = failures.at(row.number);
     } else if (simulatedValues) {
       record.result.simulatedValues = std::move(simulatedValues->at(row.number));
     }

@@ -12,35 +12,36 @@
 
 namespace mirevo {
 
-/// The files of a run by which it can be taken up again when it is cut off.
+/// The files of a run that are needed to continue it.
 struct RestartFiles {
   std::string results;
-  std::string settings;         ///< what they depend on
-  std::string simulatedValues;  ///< where the task works with them
+  std::string settings;         ///< what the results depend on
+  std::string simulatedValues;  ///< if the task uses them
+  std::string record;
+  std::string failures;
 };
 
-/// Their paths; `filePrefix` is folder and name of the setup.
+/// The paths of these files; `filePrefix` is folder and name of the setup.
 RestartFiles restartFiles(const std::string& filePrefix, const ResultFileNames& names);
 
-/// What there is to go on from.
+/// An earlier run that is to be continued.
 struct EarlierRun {
   std::vector<ResultRow> rows;  ///< in the order of their numbers
   std::string started;
   std::vector<std::string> restarted;
-  /// DDS: the searches that this one goes on from.
+  /// DDS: the searches that this one continues.
   std::vector<EarlierSearch> searches;
-  std::vector<std::string> notes;  ///< what the log should say, one line each
+  std::vector<std::string> notes;  ///< for the log, one line each
 };
 
-/// The earlier run whose results stand on disk, as the setup asks to go on from it; nothing where there is none. Rows
-/// that are cut off, or that a raised budget makes obsolete, are left out. Throws FatalError where the setup is not
-/// that of the earlier run, naming what has changed. `record`: what the earlier run has said of itself; versions of the
-/// program before the record's have left none.
+/// The earlier run whose results are on disk, to be continued as the setup asks; empty if there is none. Rows that are
+/// cut off, or that a raised budget makes obsolete, are left out. Throws FatalError, naming what has changed, if the
+/// setup is not that of the earlier run. `record` is that of the earlier run; early versions of the program wrote none.
 std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunConfig& config,
                                          const ResultColumns& columns, std::optional<RunRecord> record);
 
-/// Its evaluations by number. `failures`: why the failed ones did. `simulatedValues`: those of the others, where the
-/// task works with them; rows without them are left out, and so made again.
+/// The evaluations of an earlier run by number. `failures`: the reasons of the failed ones. `simulatedValues`: those of
+/// the others, if the task uses them; evaluations without them are left out, and therefore repeated.
 std::map<int, EarlierEvaluations::Record> earlierRecords(
     EarlierRun& run, const std::map<int, EvaluationFailure>& failures,
     std::optional<std::map<int, std::vector<double>>> simulatedValues);

@@ -29,7 +29,7 @@ bool namesAFileOfResults(const ResultSetting& setting) {
          (setting.keyword == "File_Name" && setting.section.ends_with("/OBSERVATION_FILE"));
 }
 
-/// The first `count` cells of a line and the rest of it, which may hold tabs of its own.
+/// The first `count` cells of a line, and the rest of the line, which may contain tabs.
 std::vector<std::string> cellsOf(std::string_view line, std::size_t count) {
   const std::vector<std::string_view> cells = splitAt(line, '\t', count + 1);
   if (cells.size() <= count) return {};
@@ -43,7 +43,7 @@ std::optional<std::uint64_t> unsignedNumber(std::string_view text, int base) {
   return number;
 }
 
-/// Takes one line of the file; false for one that it cannot hold.
+/// Reads one line of the file; false if it is invalid.
 bool readLine(std::string_view line, RestartSettings& settings) {
   if (line.starts_with(kSettingLine)) {
     auto cells = cellsOf(line, 3);
@@ -80,7 +80,7 @@ SettingIndex indexOf(const RestartSettings& settings) {
   return index;
 }
 
-/// A section for a person: "PARAMETER_3 (X3)" where the item has a name, else its whole path.
+/// A section for messages: "PARAMETER_3 (X3)" if the item has a name, else its whole path.
 std::string shownSection(const SettingIndex& index, std::string_view section) {
   std::size_t start = 0;
   while (start < section.size()) {
@@ -101,7 +101,7 @@ std::string shownSection(const SettingIndex& index, std::string_view section) {
 
 RestartSettings restartSettings(const RunConfig& config) {
   RestartSettings result{config.resultSettings, {}, {}};
-  if (config.task) result.searches = config.task->earlierSearches;
+  if (config.task) result.searches = config.task->earlierSearches();
   std::unordered_map<std::string, FileMark> known;  // many measures may name one file
   for (const ResultSetting& setting : result.settings) {
     if (!namesAFileOfResults(setting) || setting.value.empty()) continue;
@@ -163,7 +163,7 @@ std::vector<std::string> changedSettings(const RestartSettings& then, const Rest
   for (const ResultSetting& setting : now.settings) {
     const auto found = before.find({setting.section, setting.keyword});
     if (found == before.end()) {
-      // A keyword that an earlier version did not know worked as its default does now.
+      // An earlier version that did not know the keyword worked like its default.
       if (!setting.isDefault) note(setting, after, fmt::format("absent then, {} now", setting.value));
     } else if (found->second->value != setting.value && !(isRaised && setting.keyword == kBudgetKeyword)) {
       note(setting, after, fmt::format("{} then, {} now", found->second->value, setting.value));

@@ -10,17 +10,17 @@
 
 namespace mirevo {
 
-/// What a file that bears on the results held.
+/// The content of a file that affects the results, as a checksum.
 struct FileMark {
-  std::string section;  ///< of the keyword that names it
+  std::string section;  ///< section of the keyword that names the file
   std::string keyword;
   std::string name;         ///< as in ResultSetting::value
   std::uint64_t size = 0;   ///< bytes
-  std::uint64_t check = 0;  ///< checksum of the content; 0, with a size of 0, for one that is not there
+  std::uint64_t check = 0;  ///< checksum of the content; 0, like the size, for a file that is not there
 };
 
-/// All that the results of a run depend on, the model itself apart: it stands beside the results, so that a run is not
-/// taken up again with other settings.
+/// All that the results of a run depend on, except the model itself. It is kept beside the results, so that a run is
+/// not continued with other settings.
 struct RestartSettings {
   std::vector<ResultSetting> settings;
   std::vector<FileMark> files;
@@ -31,14 +31,14 @@ struct RestartSettings {
 RestartSettings restartSettings(const RunConfig& config);
 
 std::string formatRestartSettings(const RestartSettings& settings);
-/// Nothing for a text that is no such file, or was cut off.
+/// Empty for a text that is not such a file or is cut off.
 std::optional<RestartSettings> parseRestartSettings(std::string_view text);
 
-/// What has changed, one line each, "Upper_Bound of PARAMETER_3 (X3): 1200 then, 1000 now"; the budget of a search
-/// (`Max_No_Evaluations`) apart where it was raised.
+/// What has changed, one line each, "Upper_Bound of PARAMETER_3 (X3): 1200 then, 1000 now"; a raised budget of a search
+/// (`Max_No_Evaluations`) is not a change.
 std::vector<std::string> changedSettings(const RestartSettings& then, const RestartSettings& now);
 
-/// The budget of a search; nothing for another task.
+/// The budget of a search; empty for another task.
 std::optional<int> searchBudget(const RestartSettings& settings);
 
 }  // namespace mirevo

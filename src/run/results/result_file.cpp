@@ -14,7 +14,7 @@
 namespace mirevo {
 namespace {
 
-/// `text` as comment lines: one a line of it.
+/// The lines of `text` as comment lines.
 std::string commentLines(std::string_view text) {
   std::string lines;
   for (const std::string_view line : splitLines(text)) lines += fmt::format("# {}\n", line);
@@ -68,8 +68,8 @@ bool ResultFile::finish(std::span<const std::string> closingLines, std::string& 
   const bool isComplete = isInOrder() && aggregates_.empty();
   bool finished = isComplete ? file_.tryAppend(closing, reason) : rewriteInOrder(closing, reason);
   std::string again;
-  if (!finished && !isComplete) file_.tryAppend(closing, again);  // better out of order than without its end
-  // One that was put in order has another file in its place.
+  if (!finished && !isComplete) file_.tryAppend(closing, again);  // better out of order than without an end
+  // A file that was put in order has been replaced, so errors of the old descriptor do not matter.
   if (!file_.tryClose(again) && finished && isComplete) {
     reason = again;
     finished = false;
@@ -77,14 +77,20 @@ bool ResultFile::finish(std::span<const std::string> closingLines, std::string& 
   return finished;
 }
 
-void ResultFile::appendRow(std::string& text, std::string_view content, const Place& place) const {
+/// False for a row that is to be given its aggregate and is no longer what was written.
+bool ResultFile::appendRow(std::string& text, std::string_view content, const Place& place) const {
   const auto length = static_cast<std::size_t>(place.length) - 1;  // without the line end
   const std::string_view line = content.substr(static_cast<std::size_t>(place.offset), length);
   const auto aggregate = aggregates_.find(place.number);
-  auto row = aggregate == aggregates_.end() ? std::nullopt : readResultRow(line, columns_);
-  if (row) row->aggregate = aggregate->second;
-  text += row ? resultRowText(*row) : line;
-  text += '\n';
+  if (aggregate == aggregates_.end()) {
+    text.append(line) += '\n';
+    return true;
+  }
+  auto row = readResultRow(line, columns_);
+  if (!row) return false;
+  row->aggregate = aggregate->second;
+  text.append(resultRowText(*row)) += '\n';
+  return true;
 }
 
 bool ResultFile::rewriteInOrder(std::string_view closing, std::string& reason) const {
@@ -99,7 +105,11 @@ bool ResultFile::rewriteInOrder(std::string_view closing, std::string& reason) c
   std::string sorted;
   sorted.reserve(content->size() + closing.size());
   sorted.append(*content, 0, static_cast<std::size_t>(headLength_));
-  for (const Place& place : ordered) appendRow(sorted, *content, place);
+  for (const Place& place : ordered) {
+    if (appendRow(sorted, *content, place)) continue;
+    reason = fmt::format("the row of evaluation {} was changed by another program", place.number);
+    return false;
+  }
   sorted += closing;
   return replaceFile(path(), sorted, reason);
 }

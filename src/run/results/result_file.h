@@ -12,41 +12,40 @@
 
 namespace mirevo {
 
-/// The table of a run's evaluations: `#` head lines, a header row, a row an evaluation, `#` closing lines. Rows are
-/// written as evaluations arrive, so that a killed run leaves every finished one on disk; a file that ends orderly
-/// holds them in the order of their numbers.
+/// The table of a run's evaluations: `#` head lines, a header row, one row per evaluation, `#` closing lines. Rows are
+/// written as evaluations finish, so that a killed run leaves every finished one on disk; finish() puts them in the
+/// order of their numbers.
 class ResultFile final {
  public:
-  /// Creates the file with its head lines (without "# "), its header row and the rows of an earlier run, which is then
-  /// in the place of the earlier file: there is no moment at which a row is nowhere. Throws FatalError.
+  /// Creates the file with its head lines (without "# "), its header row and the rows of an earlier run, and replaces
+  /// the earlier file with it, so that no row is ever missing from disk. Throws FatalError.
   void open(const std::string& path, std::span<const std::string> headLines, const ResultColumns& columns,
             std::span<const ResultRow> earlierRows = {});
 
-  /// One evaluation. Throws FatalError when it cannot be written.
+  /// Writes one evaluation. Throws FatalError when that fails.
   void addRow(const ResultRow& row);
 
-  /// Gives a row another aggregate than it was written with; takes effect on disk with finish().
+  /// Changes the aggregate of a row that is written already; takes effect on disk with finish().
   void replaceAggregate(int number, double aggregate) { aggregates_[number] = aggregate; }
 
-  /// Brings the rows into the order of their numbers and writes the closing lines (without "# "). False, with the
-  /// system's reason, when that fails; what was written before is then still there. Nothing happens to a file that is
-  /// not open.
+  /// Puts the rows in the order of their numbers and writes the closing lines (without "# "). False, with the system's
+  /// reason, when that fails; what was written before is then still there. Does nothing if the file is not open.
   bool finish(std::span<const std::string> closingLines, std::string& reason);
 
   bool isOpen() const { return file_.isOpen(); }
   const std::string& path() const { return file_.path(); }
-  /// For signal handlers: -1 while no file is open.
+  /// For signal handlers; -1 while no file is open.
   int descriptor() const { return file_.descriptor(); }
 
  private:
-  /// Where a row stands in the file.
+  /// Where a row is in the file, in bytes.
   struct Place {
     int number;
     std::int64_t offset;
     std::int64_t length;
   };
   bool isInOrder() const;
-  void appendRow(std::string& text, std::string_view content, const Place& place) const;
+  bool appendRow(std::string& text, std::string_view content, const Place& place) const;
   bool rewriteInOrder(std::string_view closing, std::string& reason) const;
 
   RecordFile file_;

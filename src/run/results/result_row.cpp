@@ -12,8 +12,8 @@ namespace {
 constexpr std::string_view kOk = "OK";
 constexpr std::string_view kFailed = "FAILED";
 
-/// The order of the columns: gives each to `visit`, a single one with its name, those of a group with their names.
-/// Stops where that returns false, and returns whether it came to the end.
+/// Defines the order of the columns: calls `visit` for each, with its name, or the names for a group of columns. Stops
+/// when it returns false; returns whether all were visited.
 template <class Row, class Columns, class Visit>
 bool visitColumns(Row& row, const Columns& columns, Visit&& visit) {
   return visit(row.number, "Evaluation") && visit(row.ok, "Status") && visit(row.parameters, columns.parameters) &&
@@ -26,7 +26,7 @@ void addCell(std::string& line, std::string_view cell) {
   line += cell;
 }
 
-/// Puts the headings behind each other.
+/// Writes the headings.
 struct HeaderWriter {
   std::string line;
   bool operator()(const auto&, const char* name) {
@@ -54,10 +54,10 @@ struct RowWriter {
   }
 };
 
-/// Takes the cells of a line one after another.
+/// Reads the cells of a line one after another.
 struct RowReader {
   std::string_view rest;
-  bool isAtEnd = false;  ///< behind the last cell
+  bool isAtEnd = false;  ///< after the last cell
 
   bool operator()(int& number, const char*) {
     const auto read = parseInteger(next());

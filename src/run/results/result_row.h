@@ -13,14 +13,14 @@
 
 namespace mirevo {
 
-/// The names over those columns of a result file of which there is one per parameter, measure or objective function.
+/// The names of those columns of a result file of which there is one per parameter, measure or objective function.
 struct ResultColumns {
   std::vector<std::string> parameters;  ///< variable parameters
   std::vector<std::string> measures;
   std::vector<std::string> objectives;
 };
 
-/// One evaluation in a result file. Its columns stand in result_row.cpp, once for writing and for reading.
+/// One evaluation in a result file. result_row.cpp defines its columns, for writing and reading alike.
 struct ResultRow {
   int number = 0;                  ///< the evaluation's number in its run, from 1
   bool ok = false;                 ///< its status
@@ -30,10 +30,10 @@ struct ResultRow {
   double aggregate = kFailedRunValue;
 };
 
-/// Those of the setup's task.
+/// The columns for a setup.
 ResultColumns resultColumns(const RunConfig& config, const SearchSpace& space);
 
-/// The row of an evaluation; `parameterValues` on the model scale.
+/// The row of an evaluation; `parameterValues` are on the model scale.
 ResultRow resultRow(std::span<const double> parameterValues, const EvaluationResult& result);
 
 /// The header row, without its line end.
@@ -41,13 +41,13 @@ std::string resultHeader(const ResultColumns& columns);
 /// A row, without its line end. Numbers read back as the same 64 bits.
 std::string resultRowText(const ResultRow& row);
 
-/// How many columns a header row or a row has.
+/// Number of cells of a row or header row.
 std::size_t cellCount(std::string_view line);
-/// Whether the line is the header row of a result file, with whatever columns.
+/// Whether the line is the header row of a result file, whatever its columns.
 bool isResultHeader(std::string_view line);
 /// Whether the header row has these columns.
 bool hasColumns(std::string_view header, const ResultColumns& columns);
-/// The row of a line below a header row with these columns; nothing for a line that holds none.
+/// The row in a line below a header row with these columns; empty for a line that is not a row.
 std::optional<ResultRow> readResultRow(std::string_view line, const ResultColumns& columns);
 
 }  // namespace mirevo

@@ -1,5 +1,6 @@
 #include "run/results/result_table.h"
 
+#include <algorithm>
 #include <utility>
 
 #include "common/data_table.h"
@@ -8,7 +9,7 @@
 namespace mirevo {
 namespace {
 
-/// Takes a row's line; false for one that is damaged.
+/// Reads the line of a row; false if it is damaged.
 bool takeRow(std::string_view line, std::size_t columnCount, const ResultColumns& columns, ResultTable& table) {
   if (!table.hasExpectedCount) {
     const bool isWhole = cellCount(line) == columnCount;
@@ -16,8 +17,9 @@ bool takeRow(std::string_view line, std::size_t columnCount, const ResultColumns
     return isWhole;
   }
   auto row = readResultRow(line, columns);
-  if (row) table.rows.push_back(*std::move(row));
-  return row.has_value();
+  if (!row) return false;
+  table.rows.push_back(std::move(*row));
+  return true;
 }
 
 }  // namespace
@@ -48,6 +50,12 @@ ResultTable readResultTable(std::string_view text, const ResultColumns& columns)
     }
   }
   return table;
+}
+
+void putInOrder(std::vector<ResultRow>& rows) {
+  std::stable_sort(rows.begin(), rows.end(), [](const auto& a, const auto& b) { return a.number < b.number; });
+  rows.erase(std::unique(rows.begin(), rows.end(), [](const auto& a, const auto& b) { return a.number == b.number; }),
+             rows.end());
 }
 
 }  // namespace mirevo

@@ -9,21 +9,24 @@
 
 namespace mirevo {
 
-/// A result file as it stands on disk, be its run finished, going on or cut off.
+/// A result file as found on disk, whether its run is finished, going on or cut off.
 struct ResultTable {
-  std::vector<std::string> headLines;     ///< `#` lines before the header row, without "# "
-  bool hasHeader = false;                 ///< there is a header row
-  bool hasExpectedCount = false;          ///< with as many columns as the reader expects
-  bool hasExpectedColumns = false;        ///< with those columns, by their names
-  std::vector<ResultRow> rows;            ///< whole rows, in the order of the file; none where the count is another
-  std::size_t rowsOfOtherColumns = 0;     ///< whole rows below a header row with another count
-  std::vector<std::string> closingLines;  ///< `#` lines behind the header row, without "# "
+  std::vector<std::string> headLines;  ///< `#` lines before the header row, without "# "
+  bool hasHeader = false;
+  bool hasExpectedCount = false;          ///< the header row has as many columns as expected
+  bool hasExpectedColumns = false;        ///< the header row has the expected names
+  std::vector<ResultRow> rows;            ///< complete rows, in file order; none unless hasExpectedCount
+  std::size_t rowsOfOtherColumns = 0;     ///< complete rows if the header row has a different number of columns
+  std::vector<std::string> closingLines;  ///< `#` lines after the header row, without "# "
   std::size_t unusableLines = 0;          ///< rows that were cut off or damaged
 };
 
-/// Reads the text of a result file with these columns. A last line without its line end counts as cut off even where it
-/// can be read: the rest of its last number may be missing. Any text is taken; what is no part of a result file counts
-/// as unusable.
+/// Reads the text of a result file with these columns. A last line without a line end counts as cut off even if it can
+/// be read, since digits of its last number may be missing. Accepts any text; lines that do not belong in a result file
+/// count as unusable.
 ResultTable readResultTable(std::string_view text, const ResultColumns& columns);
+
+/// Sorts the rows by number; of several with the same number the first is kept.
+void putInOrder(std::vector<ResultRow>& rows);
 
 }  // namespace mirevo

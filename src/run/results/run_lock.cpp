@@ -29,7 +29,7 @@ bool RunLock::take(const std::string& setupFile, double patienceSeconds) {
 
 bool RunLock::isHeld(const std::string& setupFile) {
   const Descriptor file(::open(setupFile.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
-  // A shared lock for a moment: a run that begins meanwhile tries again.
+  // Holds a shared lock for a moment; a run that starts in the meantime tries again.
   return file.get() >= 0 && ::flock(file.get(), LOCK_SH | LOCK_NB) != 0 && errno == EWOULDBLOCK;
 }
 

@@ -88,8 +88,8 @@ void takeRow(const std::string& name, const std::string& value, RunRecord& recor
   if (name == key::kInitial) record.initialEvaluation = number();
   if (name == key::kBest) best().number = number().value_or(0);
   if (name == key::kBestAggregate) best().aggregate = real();
-  if (name == key::kEvaluations) record.evaluations = number().value_or(0);
-  if (name == key::kFailed) record.failed = number().value_or(0);
+  if (name == key::kEvaluations) record.evaluations = number();
+  if (name == key::kFailed) record.failed = number();
   if (auto kind = nameBehind(key::kFailedBy, name)) record.failuresByKind.emplace_back(*kind, number().value_or(0));
   if (auto objective = nameBehind(key::kSigma, name)) scaleOf(record, *objective).sigma = real();
   if (auto objective = nameBehind(key::kMu, name)) scaleOf(record, *objective).mu = real();
@@ -118,8 +118,8 @@ std::string runRecordText(const RunRecord& record, const std::vector<std::string
       rows.addCount(key::kBest, record.best->number);
       rows.add(key::kBestAggregate, record.best->aggregate);
     }
-    rows.addCount(key::kEvaluations, record.evaluations);
-    rows.addCount(key::kFailed, record.failed);
+    if (record.evaluations) rows.addCount(key::kEvaluations, *record.evaluations);
+    if (record.failed) rows.addCount(key::kFailed, *record.failed);
     for (const auto& [kind, count] : record.failuresByKind) rows.addCount(joined(key::kFailedBy, kind), count);
     for (const RunRecord::Scale& scale : record.scales) {
       rows.add(joined(key::kSigma, scale.objective), scale.sigma);

@@ -30,8 +30,8 @@ struct RunRecord {
 
   std::optional<int> initialEvaluation;
   std::optional<ShownEvaluation> best;
-  int evaluations = 0;
-  int failed = 0;
+  std::optional<int> evaluations;
+  std::optional<int> failed;
   std::vector<std::pair<std::string, int>> failuresByKind;
   /// Of one objective function, on the way to the aggregate.
   struct Scale {

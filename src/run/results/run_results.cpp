@@ -42,6 +42,10 @@ RunRecord recordOf(const RunConfig& config) {
   return record;
 }
 
+const ResultFileNames& namesOf(const RunConfig& config) {
+  return config.task ? config.task->facts().resultFiles : run_files::kPlain;
+}
+
 }  // namespace
 
 RunResults::RunResults(const RunConfig& config, const SearchSpace& space, const std::string& filePrefix)
@@ -49,16 +53,12 @@ RunResults::RunResults(const RunConfig& config, const SearchSpace& space, const 
       filePrefix_(filePrefix),
       tableHead_(tableHeadLines(config)),
       columns_(resultColumns(config, space)),
-      failedRuns_({failedRunsPath(filePrefix), runFilePath(filePrefix, run_files::kFailures)}, config.setupName,
-                  space.names, tableHead_),
-      record_(runFilePath(filePrefix, run_files::kRecord), tableHead_) {
-  if (!config.task) return;
-  files_ = restartFiles(filePrefix, config.task->facts().resultFiles);
-  if (config.restart != RestartMode::startAfresh) {
-    std::optional<RunRecord> record = record_.readEarlier();
-    followsOtherTask_ = record && record->task != config.task->facts().name.name;
-    if (followsOtherTask_) record.reset();
-    earlierRun_ = findEarlierRun(*files_, config, columns_, std::move(record));
+      names_(namesOf(config)),
+      files_(restartFiles(filePrefix, names_)),
+      failedRuns_({failedRunsPath(filePrefix), files_.failures}, config.setupName, space.names, tableHead_),
+      record_(files_.record, tableHead_) {
+  if (config.task && config.restart != RestartMode::startAfresh) {
+    earlierRun_ = findEarlierRun(files_, config, columns_, record_.readEarlier());
   }
 }
 
@@ -68,18 +68,18 @@ std::vector<EarlierSearch> RunResults::earlierSearches() const {
 
 void RunResults::open(const RunConfig& config, std::span<const ObservedSeries> observed,
                       const ObjectiveAggregator& aggregator, RunLog& log) {
-  if (!files_) return;
+  if (!config.task) return;
   if (config.keepsSimulatedValues()) {
     std::size_t count = 0;
     for (const ObservedSeries& series : observed) count += series.values.size();
-    simulatedValues_.emplace(files_->simulatedValues, count);
+    simulatedValues_.emplace(files_.simulatedValues, count);
   }
   if (earlierRun_) {
     goOn(config, aggregator, log);
   } else {
     if (config.restart != RestartMode::startAfresh)
       log.line("Restart: there are no earlier results to go on from, the run begins anew");
-    beginAnew(config, log);
+    startAfresh(config, log);
   }
 }
 
@@ -92,7 +92,7 @@ void RunResults::writeTables(std::span<const DataTable> tables) const {
   for (const DataTable& found : tables) {
     DataTable table = found;
     table.headLines.insert(table.headLines.begin(), tableHead_.begin(), tableHead_.end());
-    const std::string path = dataTablePath(filePrefix_, table.name);
+    const std::string path = runFilePath(filePrefix_, table.file);
     const std::string text = dataTableText(table);
     std::string reason;
     if (readTextFile(path, reason) == text) continue;  // of a run that is walked through again
@@ -103,14 +103,13 @@ void RunResults::writeTables(std::span<const DataTable> tables) const {
 
 void RunResults::keepEarlierFiles(const RunConfig& config, RunLog& log) const {
   keepEarlierFile(failedRuns_.paths().forPeople);
-  if (const std::string kept = keepEarlierFile(files_->results); !kept.empty()) {
+  if (const std::string kept = keepEarlierFile(files_.results); !kept.empty()) {
     log.line("The results of the earlier run were kept as " + kept);
   }
-  for (const std::string& path :
-       {files_->settings, files_->simulatedValues, record_.path(), failedRuns_.paths().table}) {
+  for (const std::string& path : {files_.settings, files_.simulatedValues, files_.record, files_.failures}) {
     keepEarlierFile(path);
   }
-  for (const RunFile& table : run_files::kAnalysisTables) keepEarlierFile(runFilePath(filePrefix_, table));
+  for (const RunFile& table : names_.tables) keepEarlierFile(runFilePath(filePrefix_, table));
   if (const std::string kept = keepEarlierFile(runFilePath(filePrefix_, run_files::kSavedFolder)); !kept.empty()) {
     log.line("The saved output files of the earlier run were kept as " + kept);
   }
@@ -118,34 +117,29 @@ void RunResults::keepEarlierFiles(const RunConfig& config, RunLog& log) const {
   for (const std::string& problem : removeFailedRunFolders(failedFolders, {})) log.warning(problem);
 }
 
-void RunResults::beginAnew(const RunConfig& config, RunLog& log) {
+void RunResults::startAfresh(const RunConfig& config, RunLog& log) {
   keepEarlierFiles(config, log);
   // Before there is a result, so that none is ever without the settings that it depends on.
-  writeRestartSettings(files_->settings, config);
+  writeRestartSettings(files_.settings, config);
   if (simulatedValues_) simulatedValues_->create();
   RunRecord record = recordOf(config);
   record.started = dateAndTimeNow();
   record_.begin(record);
-  table_.open(files_->results, headLines(config, record), columns_);
+  table_.open(files_.results, headLines(config, record), columns_);
 }
 
 void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggregator, RunLog& log) {
   EarlierRun run = *std::exchange(earlierRun_, std::nullopt);
-  std::map<int, std::vector<double>> failed;
-  std::set<int> failedNumbers;
+  std::map<int, std::vector<double>> failedSets;
+  std::set<int> failed;
   std::set<int> succeeded;
   for (const ResultRow& row : run.rows) {
-    (row.ok ? succeeded : failedNumbers).insert(row.number);
-    if (!row.ok) failed[row.number] = row.parameters;
+    (row.ok ? succeeded : failed).insert(row.number);
+    if (!row.ok) failedSets[row.number] = row.parameters;
   }
-  if (followsOtherTask_) {
-    for (const std::string& path : {record_.path(), failedRuns_.paths().table, failedRuns_.paths().forPeople}) {
-      keepEarlierFile(path);
-    }
-  }
-  const std::map<int, EvaluationFailure> failures = failedRuns_.takeUp(failed);
-  const std::string failedFolders = runFilePath(processFolderPrefix(config), run_files::kFailedFolder);
-  for (const std::string& problem : removeFailedRunFolders(failedFolders, failedNumbers)) log.warning(problem);
+  const FailedRunFile::Earlier earlier = failedRuns_.readEarlier(failed);
+  std::map<int, EvaluationFailure> failures;
+  for (const FailureRow& row : earlier.rows) failures[row.number] = row.failure;
   std::optional<std::map<int, std::vector<double>>> values;
   if (simulatedValues_) values = simulatedValues_->takeUp(succeeded);
   auto records = earlierRecords(run, failures, std::move(values));
@@ -155,11 +149,19 @@ void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggreg
   record.restarted = run.restarted;
   record.restarted.push_back(dateAndTimeNow());
   record_.begin(record);
-  table_.open(files_->results, headLines(config, record), columns_, run.rows);
-  // Only now: with a raised budget in it, rows that the smaller one had ended would be taken for the search's.
-  writeRestartSettings(files_->settings, config);
+  table_.open(files_.results, headLines(config, record), columns_, run.rows);
+  // Only now: were the run killed before, rows that are gone from the table would still be in it.
+  failedRuns_.continueBehind(earlier.rows, failedSets);
+  const std::string failedFolders = runFilePath(processFolderPrefix(config), run_files::kFailedFolder);
+  for (const std::string& problem : removeFailedRunFolders(failedFolders, failed)) log.warning(problem);
+  // With a raised budget in it, rows that the smaller one had ended would be taken for the search's.
+  writeRestartSettings(files_.settings, config);
   for (const std::string& note : run.notes) log.line(note);
-  log.line(fmt::format("Restart: {} evaluations are taken from {}", records.size(), files_->results));
+  if (earlier.unknown > 0) {
+    log.line(fmt::format("Restart: why evaluations failed is not known any more of {}: {} does not say it",
+                         earlier.unknown, files_.failures));
+  }
+  log.line(fmt::format("Restart: {} evaluations are taken from {}", records.size(), files_.results));
   earlierEvaluations_.emplace(space_, aggregator, std::move(records));
 }
 

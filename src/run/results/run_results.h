@@ -41,8 +41,8 @@ class RunResults final {
   /// Closes what stands beside the table. Throws FatalError when what was written did not all arrive.
   void close();
 
-  /// Writes what the task found, each table as `<setup>_<name>.dat`; an earlier one with other content is kept under a
-  /// numbered name. Throws FatalError.
+  /// Writes what the task found, each table to its own file; an earlier one with other content is kept under a numbered
+  /// name. Throws FatalError.
   void writeTables(std::span<const DataTable> tables) const;
 
   ResultFile& table() { return table_; }
@@ -54,7 +54,7 @@ class RunResults final {
   EarlierEvaluations* earlierEvaluations() { return earlierEvaluations_ ? &*earlierEvaluations_ : nullptr; }
 
  private:
-  void beginAnew(const RunConfig& config, RunLog& log);
+  void startAfresh(const RunConfig& config, RunLog& log);
   void keepEarlierFiles(const RunConfig& config, RunLog& log) const;
   void goOn(const RunConfig& config, const ObjectiveAggregator& aggregator, RunLog& log);
 
@@ -62,9 +62,9 @@ class RunResults final {
   std::string filePrefix_;
   std::vector<std::string> tableHead_;  ///< over every table that is for programs
   ResultColumns columns_;
-  std::optional<RestartFiles> files_;  ///< nothing for a task without results
+  ResultFileNames names_;
+  RestartFiles files_;
   std::optional<EarlierRun> earlierRun_;
-  bool followsOtherTask_ = false;  ///< the files that are one per setup were left by a run of another task
   ResultFile table_;
   FailedRunFile failedRuns_;
   RunRecordFile record_;

@@ -12,10 +12,10 @@
 namespace mirevo {
 namespace {
 
-/// Writing waits a hundred times as long as it took last, and this long at least.
+/// The pause between two writes is a hundred times the duration of the last, and at least this long.
 constexpr double kLeastSecondsBetween = 5.0;
 constexpr double kShareOfWriting = 0.01;
-/// Of evaluations whose aggregate is not known yet: 48 megabytes.
+/// For evaluations whose aggregate is not known yet: 48 megabytes.
 constexpr std::size_t kMostUnsettledSteps = 4'000'000;
 
 std::size_t stepCount(const std::vector<PeriodSeries>& series) {
@@ -65,7 +65,7 @@ void SeriesRecorder::evaluationFinished(const EvaluationResult& result, std::spa
     if (std::isnan(result.aggregate)) {
       holdUnsettled(result, values);
     } else if (best && (best->number == result.number || isSame(best->parameterValues, values))) {
-      // The best set's final model run is the best evaluation once more.
+      // The final model run of the best set repeats the best evaluation.
       const Held finished{{best->number, best->aggregate}, {values.begin(), values.end()}, result.shownSeries};
       follow(best, &finished);
     }
@@ -86,8 +86,8 @@ void SeriesRecorder::holdUnsettled(const EvaluationResult& result, std::span<con
   unsettled_[result.number] = {{result.number, result.aggregate}, {values.begin(), values.end()}, result.shownSeries};
 }
 
-/// Holds the series of the run's best evaluation, wherever they are: of the evaluation that has just finished, or of
-/// one whose aggregate was not known when it did.
+/// Keeps the series of the run's best evaluation: the one that has just finished, or one whose aggregate was not known
+/// when it finished.
 void SeriesRecorder::follow(const std::optional<BestEvaluation>& best, const Held* finished) {
   if (!best || (best_ && best_->evaluation.number == best->number && !best_->series.empty())) return;
   const auto waiting = unsettled_.find(best->number);
@@ -96,7 +96,7 @@ void SeriesRecorder::follow(const std::optional<BestEvaluation>& best, const Hel
   } else if (waiting != unsettled_.end()) {
     best_ = waiting->second;
   } else if (best_ && isSame(best_->values, best->parameterValues)) {
-    best_->evaluation.number = best->number;  // of two equal ones the search took the other
+    best_->evaluation.number = best->number;  // of two equal evaluations the search took the other
   } else {
     return;
   }
@@ -114,7 +114,7 @@ void SeriesRecorder::finish(const std::optional<BestEvaluation>& best) {
   try {
     follow(best, nullptr);
     if (isChanged_) write();
-  } catch (const std::exception& error) {  // out of memory: the run's own ending goes on
+  } catch (const std::exception& error) {  // out of memory: the end of the run must not fail
     warn(error.what());
   }
 }
@@ -139,7 +139,7 @@ void SeriesRecorder::write() {
   nextWrite_ = ended + std::max(kLeastSecondsBetween, (ended - begun) / kShareOfWriting);
 }
 
-/// The pair's series on all their times in the period.
+/// The series of the pair at all their times in the period.
 ShownSeries SeriesRecorder::shownSeries(std::size_t pair) const {
   static const PeriodSeries kNone;
   const PeriodSeries& observed = run_.observations[pair];

@@ -15,35 +15,37 @@
 
 namespace mirevo {
 
-/// What the recorder needs to know of a run. The vectors have one entry a pair of series that is compared.
+/// What the recorder needs to know of a run. `measures` and `observations` have one entry per pair of series that is
+/// compared.
 struct RecordedSeries {
   std::vector<std::string> headLines;
-  std::vector<std::string> measures;       ///< names as columns have them
-  std::vector<PeriodSeries> observations;  ///< with the times around the period's ends
-  std::int64_t periodFirst = 0;            ///< secondNumber() of the period's ends
+  std::vector<std::string> measures;       ///< names in the series file
+  std::vector<PeriodSeries> observations;  ///< with one step before and after the period
+  std::int64_t periodFirst = 0;            ///< secondNumber() of the ends of the period
   std::int64_t periodLast = 0;
-  std::vector<double> initialValues;  ///< the setup's, of the variable parameters, model scale
+  std::vector<double> initialValues;  ///< initial values of the variable parameters, model scale
 };
 
 /// Keeps `<setup>_Series.dat`: the simulated series of the initial and of the best evaluation so far. The file is
-/// replaced as a whole and never half written; so seldom that writing takes a hundredth of the run's time at most.
+/// replaced as a whole and never half written, and so rarely that writing takes at most about a hundredth of the run's
+/// time.
 class SeriesRecorder final {
  public:
-  /// `clock`: seconds, never running backwards. `warn` is told, once, why the file cannot be written.
+  /// `clock` returns seconds, never decreasing. `warn` is called once with the reason if the file cannot be written.
   SeriesRecorder(std::string path, RecordedSeries run, std::function<double()> clock,
                  std::function<void(std::string_view)> warn);
 
-  /// Takes over what an earlier run of the same setup has recorded, for evaluations of it that are not run again.
+  /// Takes over the series that an earlier run of the same setup has recorded, as its evaluations are not repeated.
   void resume(std::string_view earlierFile);
 
-  /// An evaluation has finished; `values` on the model scale. `best` is the run's best one, this one considered.
+  /// Takes a finished evaluation; `values` are on the model scale. `best` is the best of the run, including this one.
   void evaluationFinished(const EvaluationResult& result, std::span<const double> values,
                           const std::optional<BestEvaluation>& best);
 
-  /// The aggregate of an evaluation that was not known when it finished.
+  /// Takes the aggregate of an evaluation for which it was not known before.
   void aggregateSettled(int number, double aggregate);
 
-  /// At the run's end: writes what is not written yet, and never throws. `best` is the run's best evaluation.
+  /// At the end of the run: writes what is not written yet; never throws. `best` is the best evaluation of the run.
   void finish(const std::optional<BestEvaluation>& best);
 
  private:
@@ -65,7 +67,7 @@ class SeriesRecorder final {
   std::function<double()> clock_;
   std::function<void(std::string_view)> warn_;
   std::optional<Held> initial_;
-  InitialChoice initialChoice_;  ///< among the evaluations whose series are there
+  InitialChoice initialChoice_;  ///< among the evaluations that have series
   std::optional<Held> best_;
   std::map<int, Held> unsettled_;  ///< evaluations whose aggregate comes later, by number
   std::size_t unsettledSteps_ = 0;

@@ -19,8 +19,8 @@ namespace {
 constexpr std::string_view kHeader = "Measure\tTime\tObserved\tInitial\tBest";
 
 /// The head lines that say which evaluations are shown: "Initial: evaluation 2, the first that succeeded, aggregate
-/// 0.1". They are written and read by the same constants. Files of earlier versions hold these, which a restart reads:
-/// where a line is to read otherwise, reading must still know these.
+/// 0.1". The same constants serve for writing and reading. If a line is to change, these must still be read: a restart
+/// may find files of earlier versions.
 namespace head {
 constexpr std::string_view kInitial = "Initial: evaluation ";
 constexpr std::string_view kBest = "Best: evaluation ";
@@ -32,7 +32,7 @@ std::string line(std::string_view which, const ShownEvaluation& evaluation, std:
   return fmt::format("# {}{}{}{}{}\n", which, evaluation.number, origin, kAggregate, formatReal(evaluation.aggregate));
 }
 
-/// What stands behind `which`: "2, the first that succeeded, aggregate 0.1".
+/// Reads what follows kInitial or kBest: "2, the first that succeeded, aggregate 0.1".
 std::optional<ShownEvaluation> read(std::string_view text) {
   const std::size_t aggregate = text.rfind(kAggregate);
   const auto number = parseInteger(text.substr(0, text.find(',')));
@@ -144,7 +144,7 @@ SeriesTable readSeriesTable(std::string_view text) {
   bool isBelowHeader = false;
   while (!text.empty()) {
     const std::size_t end = text.find('\n');
-    if (end == std::string_view::npos) break;  // a cut-off line: the rest of its last number may be missing
+    if (end == std::string_view::npos) break;  // a cut-off line: digits of its last number may be missing
     const std::string_view line = trimTrailing(text.substr(0, end));
     text.remove_prefix(end + 1);
     if (isBelowHeader) {

@@ -13,7 +13,7 @@
 namespace mirevo {
 namespace {
 
-/// The last bytes tell apart machines that store numbers in another order.
+/// The last bytes show whether a machine stores numbers in another byte order.
 constexpr std::uint64_t kFormatMark = 0x4d69726576307631ULL;
 
 template <class Number>

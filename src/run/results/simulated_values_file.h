@@ -11,25 +11,25 @@
 
 namespace mirevo {
 
-/// The simulated values at the observation times of every evaluation, for a task that works with them: the result file
-/// does not hold them, and a restarted run needs those of the evaluations that it does not make again. Binary, a record
-/// an evaluation: its number, the values, a checksum of both. It is no file for other programs: a run on a machine that
-/// stores numbers in another way takes it for damaged and makes the evaluations again.
+/// The simulated values at the observation times of every evaluation, for a task that uses them: the result file does
+/// not hold them, and a restarted run needs those of the evaluations that it does not repeat. Binary, one record per
+/// evaluation: its number, the values, a checksum of both. Not meant for other programs: on a machine with another
+/// number format the file counts as damaged, and the evaluations are repeated.
 class SimulatedValuesFile final {
  public:
   /// `valueCount`: values of one evaluation.
   SimulatedValuesFile(std::string path, std::size_t valueCount);
 
-  /// Makes the file anew. Throws FatalError.
+  /// Creates the file, replacing an existing one. Throws FatalError.
   void create();
-  /// Takes up the file of an interrupted run: keeps the records of the evaluations with those numbers, goes on behind
-  /// them and returns their values by number. A record that is cut off or damaged, or of other evaluations, is left
-  /// out. Throws FatalError when the file cannot be written.
+  /// Continues the file of an interrupted run: keeps the records of the evaluations with these numbers, appends to them
+  /// from now on, and returns their values by number. Records that are cut off, damaged or of other evaluations are
+  /// dropped. Throws FatalError when the file cannot be written.
   std::map<int, std::vector<double>> takeUp(const std::set<int>& numbers);
 
-  /// The values of an evaluation that succeeded. Throws FatalError when they cannot be written.
+  /// Writes the values of a successful evaluation. Throws FatalError when that fails.
   void add(const EvaluationResult& result);
-  /// Throws FatalError when what was added did not all arrive.
+  /// Throws FatalError if not everything written has reached the file.
   void close() { file_.close(); }
 
   const std::string& path() const { return path_; }

@@ -4,24 +4,12 @@
 
 #include <fmt/format.h>
 
+#include "algorithms/searches/search_methods.h"
 #include "measures/statistics.h"
 #include "run/setup/validation.h"
 
 namespace mirevo {
 namespace {
-
-/// Rows of these settings bear on no result.
-constexpr bool kNotOfResults = false;
-
-std::string nameOfMeasure(const void* measure) {
-  return static_cast<const OutputMeasure*>(measure)->name;
-}
-std::string nameOfObjective(const void* objective) {
-  return static_cast<const ObjectiveFunction*>(objective)->name;
-}
-std::string nameOfParameter(const void* parameter) {
-  return static_cast<const ModelParameter*>(parameter)->name;
-}
 
 SettingSection<SeriesReference> seriesSection(std::string_view path, std::string_view meaning,
                                               std::string_view fileMeaning) {
@@ -29,7 +17,7 @@ SettingSection<SeriesReference> seriesSection(std::string_view path, std::string
            "for each measure of interface type 0",
            meaning,
            {setting<&SeriesReference::fileName>(
-                {.name = "File_Name", .type = KeywordType::fileName, .meaning = fileMeaning}),
+                {.name = "File_Name", .type = KeywordType::fileName, .meaning = std::string(fileMeaning)}),
             setting<&SeriesReference::itemNo>(
                 {.name = "Item_No", .defaultValue = "1", .meaning = "Which item of the file, from 1."})}}};
 }
@@ -127,8 +115,9 @@ const SettingSection<ModelParameter>& parameterSection() {
              .meaning = "Lowest value. Greater than 0 for a logarithmic variable parameter."}),
         setting<&Parameter::upperBound>({.name = "Upper_Bound",
                                          .unit = "of the parameter",
-                                         .meaning = "Highest value, not below the lowest; above it for a variable "
-                                                    "parameter that SCE or PSE searches."}),
+                                         .meaning = fmt::format("Highest value, not below the lowest; above it for a "
+                                                                "variable parameter that {} searches.",
+                                                                searchesWith(&SearchFacts::needsRanges, " or "))}),
         setting<&Parameter::transformationType>(
             {.name = "Transformation_Type",
              .defaultValue = "0",
@@ -160,7 +149,7 @@ const SettingSection<ModelParameter>& parameterSection() {
                                       .defaultValue = "''",
                                       .meaning = "Free text.",
                                       .bearsOnResults = kNotOfResults})},
-       nameOfParameter}};
+       itemName<Parameter>([](const Parameter& parameter) { return parameter.name; })}};
   return section;
 }
 
@@ -245,7 +234,7 @@ const SettingSection<OutputMeasure>& measureSection() {
              .refusal = "Error: Statistic type invalid for output measure ",
              .meaning = "Of the weighted differences simulated minus observed: 0 mean, 1 root mean square, 2 standard "
                         "deviation; weighted difference of 3 the largest, 4 the smallest values."}),
-        // One text for both weights on purpose; the location below it tells them apart.
+        // Deliberately the same text for both weights; the location below it shows which one is meant.
         setting<&Measure::weight>({.name = "Weight",
                                    .defaultValue = "1.0",
                                    .range = kNonNegative,
@@ -260,7 +249,7 @@ const SettingSection<OutputMeasure>& measureSection() {
                                          .defaultValue = "''",
                                          .meaning = "The objective function that the measure belongs to; if blank, the "
                                                     "measure is only reported."})},
-       nameOfMeasure}};
+       itemName<Measure>([](const Measure& measure) { return measure.name; })}};
   return section;
 }
 
@@ -278,43 +267,51 @@ const SettingSection<SeriesReference>& observationFileSection() {
   return section;
 }
 
-const SettingSection<ObjectiveFunction>& objectiveSection() {
-  using Function = ObjectiveFunction;
-  static const SettingSection<ObjectiveFunction> section{
+const SettingSection<ObjectiveSection>& objectiveSection() {
+  using Section = ObjectiveSection;
+  static const SettingSection<Section> section{
       {"ObjectiveFunctions/OBJECTIVE_FUNCTIONS/OBJECTIVE_n",
        "for each item",
        "An objective function over the output measures that name it.",
-       {setting<&Function::name>({.name = "Name",
-                                  .type = KeywordType::name,
-                                  .meaning = "Unique name, by which output measures refer to it."}),
-        setting<&Function::functionType>(
+       {checked<Section>(setting<Section>([](auto& s) -> auto& { return s.function.name; },
+                                          {.name = "Name",
+                                           .type = KeywordType::name,
+                                           .meaning = "Unique name, by which output measures refer to it.",
+                                           .checkOrder = 1}),
+                         [](const Section& s) { return validateObjectiveFunction(s.function, s.names); }),
+        setting<Section>(
+            [](auto& s) -> auto& { return s.function.functionType; },
             {.name = "Function_Type",
              .defaultValue = "0",
              .range = between(0, 2),
              .codes = kFunctionTypeNames,
              .refusal = "Error: Function type invalid for objective function ",
              .meaning = "Over its output measures: 0 sum of the values, 1 of the absolute values, 2 of the squares."}),
-        setting<&Function::weight>({.name = "Weight",
-                                    .defaultValue = "1.0",
-                                    .range = kNonNegative,
-                                    .refusal = "Error: Weight invalid for objective function ",
-                                    .meaning = "Weight in the aggregate."}),
-        setting<&Function::standardDeviation>(
+        setting<Section>([](auto& s) -> auto& { return s.function.weight; },
+                         {.name = "Weight",
+                          .defaultValue = "1.0",
+                          .range = kNonNegative,
+                          .refusal = "Error: Weight invalid for objective function ",
+                          .meaning = "Weight in the aggregate."}),
+        setting<Section>(
+            [](auto& s) -> auto& { return s.function.standardDeviation; },
             {.name = "Standard_Deviation",
              .defaultValue = kNoDefault,
              .range = kPositive,
              .refusal = "Error: Standard deviation invalid for objective function ",
              .unit = "of the function",
              .meaning = "Scale of the transformation of aggregation methods 1 and 2. Without it, that of the search's "
-                        "initial sample."}),
-        setting<&Function::location>(
+                        "initial sample.",
+             .checkOrder = 2}),
+        setting<Section>(
+            [](auto& s) -> auto& { return s.function.location; },
             {.name = "Location",
              .defaultValue = kNoDefault,
              .unit = "of the function",
              .meaning =
                  "Location of the transformation: added after the division by the standard deviation (method 1), "
                  "or the mean (method 2). Without it, from the search's initial sample."})},
-       nameOfObjective}};
+       itemName<Section>([](const Section& s) { return s.function.name; })}};
   return section;
 }
 

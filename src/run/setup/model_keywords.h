@@ -4,10 +4,17 @@
 
 #include "common/settings/keyword_row.h"
 #include "run/setup/run_config.h"
+#include "run/setup/validation.h"
 
 namespace mirevo {
 
-// The sections that describe the model, its parameters, and how its runs are judged, with their keywords.
+// The sections that describe the model, its parameters and the assessment of its runs, with their keywords.
+
+/// An objective function, and the names of the previous ones.
+struct ObjectiveSection {
+  ObjectiveFunction& function;
+  NamesUsed& names;
+};
 
 const SettingSection<BatchItem>& batchItemSection();
 const SettingSection<ParameterFileItem>& parameterFileSection();
@@ -18,11 +25,11 @@ const SettingSection<RunConfig>& judgementSection();
 const SettingSection<OutputMeasure>& measureSection();
 const SettingSection<SeriesReference>& simulationFileSection();
 const SettingSection<SeriesReference>& observationFileSection();
-const SettingSection<ObjectiveFunction>& objectiveSection();
+const SettingSection<ObjectiveSection>& objectiveSection();
 const SettingSection<SavedOutputFile>& savedFileSection();
 const SettingSection<RunConfig>& measureFileSection();
 
-/// The section of a list: its count alone. `path` is below the target.
+/// The section of a list, which has only its count. `path` is below the target.
 const SectionRow& listSection(std::string_view path);
 
 }  // namespace mirevo

@@ -13,7 +13,7 @@
 namespace mirevo {
 namespace {
 
-/// The FNV-1a hash: the same number for the same text on every machine.
+/// The 32-bit FNV-1a hash: the same number for the same text on every machine.
 std::uint32_t hashOf(std::string_view text) {
   std::uint32_t hash = 2166136261U;
   for (const char c : text) hash = (hash ^ static_cast<unsigned char>(c)) * 16777619U;
@@ -40,7 +40,7 @@ int RunConfig::plannedModelRuns() const {
 
 std::string processFolderPrefix(const RunConfig& config) {
   if (config.processFolder.empty()) return fmt::format("{}/{}", config.setupFolder, config.setupName);
-  // Setups of one name that lie in different folders may share this one.
+  // Setups with the same name in different folders may share this folder.
   return fmt::format("{}/{}-{:08x}", config.processFolder, config.setupName, hashOf(config.setupFolder));
 }
 

@@ -18,7 +18,7 @@ namespace mirevo {
 enum class RestartMode : std::int32_t {
   startAfresh = 0,
   goOn = 1,
-  goOnAndRepeatFailed = 2  ///< failed runs at the end are made again
+  goOnAndRepeatFailed = 2  ///< failed runs at the end are repeated
 };
 
 /// A file that the model writes and the run keeps.
@@ -26,16 +26,15 @@ struct SavedOutputFile {
   std::string fileName;
 };
 
-/// All settings of a run. File names are absolute. Composed of the settings that each part defines for itself; no part
-/// below the run driver sees the whole.
+/// All settings of a run, composed of those that each part of the program defines for itself. File names are absolute.
 struct RunConfig {
   std::string setupFile;    ///< absolute path
   std::string setupFolder;  ///< absolute, without a trailing separator
   std::string setupName;    ///< file name without the ending ".kdx"
 
-  std::unique_ptr<Task> task;  ///< nullptr where the simulation option names none: nothing is run
+  std::unique_ptr<Task> task;  ///< nullptr if the simulation option names none: nothing is run
   std::string title;
-  bool writesReport = true;  ///< at the end of the run
+  bool writesReport = true;  ///< a report at the end of the run
   std::vector<BatchItem> batchItems;
   std::string baseFolder;  ///< the folder of the first batch file
   std::vector<ParameterFileItem> parameterFiles;
@@ -49,40 +48,40 @@ struct RunConfig {
   std::vector<SavedOutputFile> savedOutputFiles;
 
   std::int32_t simultaneousSimulations = 1;
-  bool usesMpiWorkers = false;  ///< then `simultaneousSimulations` is 1, on each worker
+  bool usesMpiWorkers = false;  ///< then `simultaneousSimulations` is 1, for each worker
   bool useSingleThread = false;
-  std::string processFolder;       ///< where the process folders are made; empty: beside the setup
-  double maxSimulationTime = 0.0;  ///< seconds that a model run may take; 0: any
+  std::string processFolder;       ///< folder for the process folders; empty: that of the setup
+  double maxSimulationTime = 0.0;  ///< longest time of a model run, s; 0: no limit
 
   RestartMode restart = RestartMode::startAfresh;
   std::int32_t failedRunFolders = 3;          ///< failed model runs whose process folder is kept
-  std::vector<ResultSetting> resultSettings;  ///< in reading order; what may not change when a run is continued
+  std::vector<ResultSetting> resultSettings;  ///< in reading order; must be unchanged when a run is continued
 
-  /// Model evaluations that the task plans; sizes the failed-run limit. 0 without a task.
+  /// Model evaluations that the task plans, on which the failed-run limit is based. 0 without a task.
   int plannedEvaluations() const;
-  /// These and the final model run of a search: what progress counts towards.
+  /// plannedEvaluations() and the final model run of a search, for the progress.
   int plannedModelRuns() const;
   /// Whether the task's results depend on the random seed.
   bool drawsRandomNumbers() const { return task && task->drawsRandomNumbers(); }
-  /// Whether the task works with simulated values at the observation times.
+  /// Whether the task uses simulated values at the observation times.
   bool keepsSimulatedValues() const { return task && task->keepsSimulatedValues(); }
   /// "Parameter optimisation: Dynamically Dimensioned Search"; "none" without a task.
   std::string taskDescription() const { return task ? task->description() : "none"; }
   std::size_t variableParameterCount() const;
 };
 
-/// What the names of folders that the run makes for its model runs begin with.
+/// The beginning of the paths of the folders that the run makes for its model runs.
 std::string processFolderPrefix(const RunConfig& config);
 
-/// Where a setup file is and what the files of its run are named after.
+/// Where a setup file is, and the name after which the files of its run are named.
 struct SetupLocation {
   std::string file;    ///< absolute path
   std::string folder;  ///< absolute, without a trailing separator
   std::string name;    ///< file name without the ending ".kdx"
 };
 
-/// The location of a setup file named on the command line; `fileName` may be relative and end in blanks. Asks the
-/// system for the current folder only.
+/// The location of a setup file named on the command line; `fileName` may be relative and end in blanks. Does not
+/// access the file.
 SetupLocation locateSetup(const std::string& fileName);
 
 }  // namespace mirevo

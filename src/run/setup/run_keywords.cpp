@@ -1,14 +1,14 @@
 #include "run/setup/run_keywords.h"
 
+#include <fmt/format.h>
+
+#include "algorithms/searches/search_methods.h"
 #include "run/setup/model_keywords.h"
 #include "run/setup/validation.h"
 #include "run/tasks/tasks.h"
 
 namespace mirevo {
 namespace {
-
-/// Rows of these settings bear on no result.
-constexpr bool kNotOfResults = false;
 
 constexpr CodeName kRestartNames[] = {{0, "no"}, {1, "continue"}, {2, "continue and repeat failed runs"}};
 
@@ -31,11 +31,11 @@ const SettingSection<RunConfig>& simulationOptionSection() {
       {"MIREVO_SIMULATION_OPTION",
        "always",
        "The task of the run and the model that it runs.",
-       {choice<RunConfig>([](RunConfig& config, const SetupValue& value) { config.task = makeTask(value); },
+       {choice<RunConfig>([](RunConfig& config, const SetupValue& value) { config.task = tasks().make(value); },
                           {.name = "Option",
-                           .codes = taskNames(),
-                           .meaning = "The task: 0 scenario runs, 1 sensitivity analysis, 2 parameter optimisation, 3 "
-                                      "uncertainty analysis. Any other number runs nothing and ends normally."}),
+                           .codes = tasks().names(),
+                           .meaning = fmt::format("The task: {}. Any other number runs nothing and ends normally.",
+                                                  tasks().meanings())}),
         setting<&RunConfig::title>({.name = "Title",
                                     .defaultValue = "''",
                                     .meaning = "Title of the run, in the log and the result files.",
@@ -80,9 +80,10 @@ const SettingSection<RunConfig>& slotsSection() {
                  .range = from(1),
                  .refusal = "Error: Invalid No. of processes",
                  .unit = "model runs",
-                 .meaning = "Model runs at once, each in a process folder of its own; no more than the run "
-                            "has evaluations. In an optimisation more than 1 needs PSE. In an MPI job: 1 "
-                            "on each worker.",
+                 .meaning = fmt::format(
+                     "Model runs at once, each in a process folder of its own; no more than the run has evaluations. "
+                     "In an optimisation more than 1 needs {}. In an MPI job: 1 on each worker.",
+                     searchesWith(&SearchFacts::runsInParallel, " or ")),
                  .bearsOnResults = kNotOfResults}),
             [](const RunConfig& config) { return validateProcessCount(config); }),
         setting<&RunConfig::useSingleThread>({.name = "UseSingleThread",
@@ -128,7 +129,7 @@ const SetupSchema& setupSchema() {
                                         &objectiveSection().row,
                                         &listSection("SAVE_OUTPUT_FILES"),
                                         &savedFileSection().row};
-    for (const auto& task : allTasks()) {
+    for (const auto& task : tasks().all()) {
       const auto sections = task->sections();
       rows.insert(rows.end(), sections.begin(), sections.end());
     }

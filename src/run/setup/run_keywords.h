@@ -6,13 +6,13 @@
 
 namespace mirevo {
 
-/// The section MIREVO_SIMULATION_OPTION: the task and what goes with every run.
+/// The section MIREVO_SIMULATION_OPTION: the task and the settings of every run.
 const SettingSection<RunConfig>& simulationOptionSection();
 /// The section SimultaneousSimulations.
 const SettingSection<RunConfig>& slotsSection();
 
-/// Every section of a setup with its keywords, in reading order: those of the model and of the run, and between them
-/// those of every task and search.
+/// Every section of a setup with its keywords, in reading order: those of the model, of every task and search, and of
+/// the run.
 const SetupSchema& setupSchema();
 
 }  // namespace mirevo

@@ -19,8 +19,8 @@
 namespace mirevo {
 namespace {
 
-/// Endings of files that set up or start a model. Beside the setup file and under its name, such a file could be taken
-/// for, or overwritten by, a file of the run.
+/// Endings of files that set up or start a model. Such a file beside the setup, with the setup's name, could be
+/// mistaken for or overwritten by a file of the run.
 constexpr std::array<std::string_view, 14> kModelSetupEndings = {
     ".bat", ".cmd", ".sh", ".exe", ".sim", ".mod", ".run", ".inp", ".ini", ".cfg", ".ctl", ".par", ".set", ".dat"};
 
@@ -184,19 +184,23 @@ void SetupReader::readObjectiveFunctions() {
                    measureSections.push_back(opened);
                  });
   NamesUsed names;
-  section.open("OBJECTIVE_FUNCTIONS")
-      .readItems("OBJECTIVE_", objectiveSection(), config_.objectives, "Error: No objective functions defined",
-                 [this, &names](const SetupSection& opened, const ObjectiveFunction& function) {
-                   opened.require(validateObjectiveFunction(function, names));
-                   objectiveSections_.push_back(opened);
-                 });
+  const SetupSection functions = section.open("OBJECTIVE_FUNCTIONS");
+  const std::size_t count = functions.readCount("OBJECTIVE_");
+  for (std::size_t i = 0; i < count; ++i) {
+    objectiveSections_.push_back(functions.openItem("OBJECTIVE_", i + 1));
+    ObjectiveSection filled{config_.objectives.emplace_back(), names};
+    objectiveSections_.back().read(objectiveSection(), filled);
+  }
+  if (count == 0) {
+    functions.refuse("Error: No objective functions defined", kItemCountKeyword, "expected 1 or more, found 0");
+  }
   connectMeasures(measureSections);
   if (!config_.task || !config_.task->mayHaveInitialSample()) requireScales(false);
 }
 
 void SetupReader::readSeries(const SetupSection& section, OutputMeasure& measure) const {
   const std::int64_t number = std::ssize(config_.measures);
-  // A measure that the model writes itself needs no series; such sections are read where they are present.
+  // A measure that the model writes itself needs no series; its sections are read if present.
   const bool needsSeries = measure.interfaceType == InterfaceType::timeSeries;
   const auto open = [&](std::string_view name) {
     return needsSeries ? std::optional(section.open(name)) : section.openIfPresent(name);
@@ -220,7 +224,7 @@ void SetupReader::readSeries(const SetupSection& section, OutputMeasure& measure
   }
 }
 
-/// Gives each objective function the measures that name it.
+/// Adds to each objective function the measures that name it.
 void SetupReader::connectMeasures(const std::vector<SetupSection>& measureSections) {
   std::vector<std::string> names;
   std::unordered_map<std::string_view, std::size_t> byName;
@@ -275,7 +279,7 @@ void SetupReader::readSimultaneousSimulations() {
     config_.simultaneousSimulations = 1;
     return;
   }
-  // A slot has its own copy of the model: ones without work would only fill the disk.
+  // A slot has its own copy of the model; unused slots would only fill the disk.
   const int mostUsed = std::max(1, config_.plannedEvaluations());
   if (config_.simultaneousSimulations <= mostUsed) return;
   section.warn(kSlotsKeyword, fmt::format("only {} can be used by the evaluations of this run", mostUsed));

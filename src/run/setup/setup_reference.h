@@ -4,7 +4,7 @@
 
 namespace mirevo {
 
-/// The reference page of the manual (Markdown), made from the keyword table: docs/setup-reference.md.
+/// The reference page of the manual (Markdown), made from the keyword rows: docs/setup-reference.md.
 std::string setupReference();
 
 }  // namespace mirevo

@@ -9,12 +9,12 @@
 
 namespace mirevo {
 
-/// How a measure comes about: "root mean square", "written by the model".
+/// The description of how a measure is computed: "root mean square", "written by the model".
 std::string_view statisticName(const OutputMeasure& measure);
 
-/// What the run is about to do, for the log, several lines without a line end behind the last: task, parameters with
-/// their bounds on the model's and the search's scale, measures, objective functions, evaluations, slots.
-/// `evaluationOrder` holds the 1-based numbers of all parameters in the order in which they get their values.
+/// A summary of the setup for the log, in several lines without a final line end: task, parameters with their bounds on
+/// the model and search scales, measures, objective functions, evaluations, slots. `evaluationOrder` holds the 1-based
+/// numbers of all parameters in the order in which they are evaluated.
 std::string setupSummary(const RunConfig& config, const SearchSpace& space, std::span<const int> evaluationOrder);
 
 }  // namespace mirevo

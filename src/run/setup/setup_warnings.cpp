@@ -8,14 +8,14 @@
 namespace mirevo {
 namespace {
 
-/// A misread file could give a warning a line; a log that nobody can read helps nobody.
+/// Limits the log if, for instance, every line of a file gives a warning.
 constexpr int kMostWarnings = 50;
 
 class EntryCheck final {
  public:
   explicit EntryCheck(SetupFile& file) : file_(file) {}
 
-  /// Depth is that of the parser at most.
+  /// Recursive; the parser limits the depth.
   void checkInside(const KdxSection& node, const std::string& pattern) {
     for (const KdxKeyword& keyword : node.keywords()) checkKeyword(node, keyword, pattern);
     for (const auto& section : node.sections()) {
@@ -74,7 +74,7 @@ class EntryCheck final {
 
 void warnAboutUnusedEntries(SetupFile& file) {
   EntryCheck check(file);
-  // Other targets belong to other programs; a second one of ours would go unread.
+  // Other targets belong to other programs; a second one with this program's name would not be read.
   const KdxSection& root = file.document().root;
   const KdxSection* target = root.section(kSetupTarget);
   if (target == nullptr) return;

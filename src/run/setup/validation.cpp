@@ -28,7 +28,7 @@ SettingRefusal refuseRepeated(std::string_view message, const std::string& name,
 }  // namespace
 
 std::optional<SettingRefusal> validateParameterBounds(const ModelParameter& parameter) {
-  // First, as the initial value is outside such bounds whatever it is.
+  // Checked first, as every initial value is outside such bounds.
   if (parameter.lowerBound > parameter.upperBound) {
     return SettingRefusal{"Error: Lower bound larger than upper bound for parameter " + parameter.name, "Lower_Bound",
                           fmt::format("expected {} or less, found {}", parameter.upperBound, parameter.lowerBound)};
@@ -50,7 +50,7 @@ std::optional<SettingRefusal> validateParameterDefinition(const ModelParameter& 
   if (!names.insert(parameter.name).second) {
     return refuseRepeated("Error: Invalid parameter name", parameter.name, "Parameter_Name", "parameter");
   }
-  // The upper bound and the initial value are not below the lower bound.
+  // Only the lower bound matters: the upper bound and the initial value are not below it.
   const bool hasLogarithm =
       parameter.transformationType != TransformationType::logarithmic || parameter.lowerBound > 0.0;
   if (parameter.parameterType != ParameterType::variable || hasLogarithm) return std::nullopt;
@@ -99,11 +99,12 @@ std::optional<SettingRefusal> validateTransformation(const ObjectiveFunction& fu
 }
 
 std::optional<SettingRefusal> validateProcessCount(const RunConfig& config) {
-  const bool mayRun = config.usesMpiWorkers || !config.task || config.task->runsInParallel();
-  if (mayRun || config.simultaneousSimulations <= 1) return std::nullopt;
-  return SettingRefusal{"Error: Use Population Simplex Evolution algorithm for application with multiple processors",
-                        kSlotsKeyword,
-                        fmt::format("expected 1 with this Algorithm_Type, found {}", config.simultaneousSimulations)};
+  if (config.usesMpiWorkers || !config.task || config.simultaneousSimulations <= 1) return std::nullopt;
+  const std::optional<OneSlotOnly> only = config.task->needsOneSlot();
+  if (!only) return std::nullopt;
+  return SettingRefusal{
+      std::string(only->refusal), kSlotsKeyword,
+      fmt::format("expected 1 with this {}, found {}", only->keyword, config.simultaneousSimulations)};
 }
 
 }  // namespace mirevo

@@ -5,10 +5,10 @@
 
 namespace mirevo {
 
-/// The names of what an analysis tells of.
+/// The names of the parameters, measures and objective functions of an analysis.
 AnalysisNames analysisNames(const TaskContext& context);
 
-/// An empty line and the lines, to the log.
+/// Writes an empty line and the lines of the report to the log.
 void logReport(const TaskContext& context, std::span<const std::string> report);
 
 }  // namespace mirevo

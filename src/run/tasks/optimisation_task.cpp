@@ -12,6 +12,7 @@
 namespace mirevo {
 namespace {
 
+constexpr std::string_view kAlgorithmKeyword = "Algorithm_Type";
 constexpr std::string_view kSurrogateKeyword = "Use_Surrogate_Model";
 
 const SettingSection<OptimisationTask>& optimisationSection() {
@@ -20,22 +21,22 @@ const SettingSection<OptimisationTask>& optimisationSection() {
        "when `Option` is 2",
        "Parameter optimisation.",
        {choice<OptimisationTask>(
-            [](OptimisationTask& task, const SetupValue& value) { task.method = makeSearchMethod(value); },
-            {.name = "Algorithm_Type",
+            [](OptimisationTask& task, const SetupValue& value) { task.method = searchMethods().make(value); },
+            {.name = kAlgorithmKeyword,
              .range = between(0, 2),
-             .codes = searchNames(),
+             .codes = searchMethods().names(),
              .refusal = "Error: Invalid optimisation algorithm type selection",
-             .meaning = "0 Shuffled Complex Evolution, 1 Population Simplex Evolution, 2 Dynamically Dimensioned "
-                        "Search."}),
+             .meaning = searchMethods().meanings() + "."}),
         setting<&OptimisationTask::surrogateUse>(
             {.name = kSurrogateKeyword,
              .defaultValue = "0",
              .codes = kNoYesNames,
-             .meaning = "0 no, 1 yes; for SCE and PSE. Any other number runs no search."})}}};
+             .meaning = fmt::format("0 no, 1 yes; for {}. Any other number runs no search.",
+                                    searchesWith(&SearchFacts::usesSurrogate, " and "))})}}};
   return section;
 }
 
-/// Searches with a population measure it by each parameter's range. An integer parameter always has one.
+/// The range of an integer parameter is never empty.
 void refuseEmptyRanges(const TaskReading& reading) {
   for (std::size_t i = 0; i < reading.parameters.size(); ++i) {
     const ModelParameter& parameter = reading.parameters[i];
@@ -45,8 +46,8 @@ void refuseEmptyRanges(const TaskReading& reading) {
     }
     reading.parameterSections[i].refuse(
         "Error: Lower bound equal to upper bound for parameter " + parameter.name, "Upper_Bound",
-        fmt::format("expected more than {} for a search by SCE or PSE; Parameter_Type = 1 fixes a parameter",
-                    parameter.lowerBound));
+        fmt::format("expected more than {} for a search by {}; Parameter_Type = 1 fixes a parameter",
+                    parameter.lowerBound, searchesWith(&SearchFacts::needsRanges, " or ")));
   }
 }
 
@@ -74,13 +75,13 @@ void logBestSet(const TaskContext& context, const ParameterSet& best, const Eval
 }  // namespace
 
 const TaskFacts& OptimisationTask::facts() const {
-  static constexpr TaskFacts kFacts{{2, "optimisation"}, run_files::kOptimisation};
+  static constexpr TaskFacts kFacts{{2, "optimisation"}, "parameter optimisation", run_files::kOptimisation};
   return kFacts;
 }
 
 std::vector<const SectionRow*> OptimisationTask::sections() const {
   std::vector<const SectionRow*> rows{&optimisationSection().row};
-  for (const auto& search : searchMethods()) rows.push_back(search->section().row);
+  for (const auto& search : searchMethods().all()) rows.push_back(search->section().row);
   rows.insert(rows.end(), {&initialSampleSection().row, &stoppingSection().row, &surrogateSection().row});
   return rows;
 }
@@ -106,12 +107,12 @@ void OptimisationTask::read(const TaskReading& reading) {
   if (surrogateUse == SurrogateUse::yes) readSurrogate(reading, section, stops);
 }
 
-void OptimisationTask::readMethod(const TaskReading& reading, const SetupSection& section) {
-  if (method->facts().drawsInitialSample) refuseEmptyRanges(reading);
+void OptimisationTask::readMethod(const TaskReading& reading, const SetupSection& section) const {
+  if (method->facts().needsRanges) refuseEmptyRanges(reading);
   const BoundSection bound = method->section();
   const SetupSection control = section.open(nameInside(*bound.row));
   control.read(bound);
-  // Too small a population or simplex spans too few directions and ends early, away from the optimum.
+  // A population or simplex that is too small spans too few directions and converges early, away from the optimum.
   for (const SearchAdvice& advice : method->advice(reading.variableCount)) {
     if (advice.found >= advice.advised) continue;
     control.warn(advice.keyword, fmt::format("found {}, at least {} are advised for the number of variable parameters",
@@ -135,21 +136,21 @@ void OptimisationTask::readStopping(const SetupSection& section) {
 void OptimisationTask::readSurrogate(const TaskReading& reading, const SetupSection& section,
                                      const SetupSection& stoppingSection) {
   const SetupSection control = section.open(nameInside(surrogateSection().row));
-  control.read(surrogateSection(), surrogate);
-  std::optional<double> available;
-  if (usesSurrogate()) available = evaluationsAfter(*method, surrogate.initialGenerations);
-  control.require(validateSurrogateControl(surrogate, reading.variableCount, available));
+  SurrogateSection filled{surrogate, reading.variableCount};
+  control.read(surrogateSection(), filled);
   if (!usesSurrogate()) {
     section.warn(kSurrogateKeyword, fmt::format("{} uses no surrogate model", method->facts().longName));
     return;
   }
-  // A budget that is spent before the surrogate model has enough evaluated sets is spent without it.
+  const double available = evaluationsAfter(*method, surrogate.initialGenerations);
+  control.require(validateSurrogateControl(surrogate, available));
+  // Warns if the budget is used up before the surrogate model has enough evaluated sets.
   const auto sample = static_cast<double>(method->populationSize());
   const auto sets = static_cast<double>(leastSetCount(surrogate, reading.variableCount));
   const double initialLoops = surrogate.initialGenerations;
   const double before = std::max(sets, evaluationsAfter(*method, std::max(method->loopsBefore(sets), initialLoops)));
   const std::int32_t budget = stopping.maxEvaluations;
-  if (budget <= sample || budget > before) return;  // where there is no loop, the surrogate makes no difference
+  if (budget <= sample || budget > before) return;  // without a loop the surrogate would not be used anyway
   stoppingSection.warn(
       kBudgetKeyword,
       fmt::format("found {}, the surrogate model chooses nothing before {} model evaluations: it waits for "
@@ -158,7 +159,7 @@ void OptimisationTask::readSurrogate(const TaskReading& reading, const SetupSect
 }
 
 std::string OptimisationTask::description() const {
-  return fmt::format("Parameter optimisation: {}{}", method ? method->facts().longName : "",
+  return fmt::format("Parameter optimisation: {}{}", method->facts().longName,
                      usesSurrogate() ? " with surrogate model" : "");
 }
 
@@ -170,10 +171,16 @@ std::vector<std::string> OptimisationTask::summaryLines(std::size_t variableCoun
       surrogate.initialGenerations)};
 }
 
+std::optional<OneSlotOnly> OptimisationTask::needsOneSlot() const {
+  if (method->facts().runsInParallel) return std::nullopt;
+  return OneSlotOnly{"Error: Use Population Simplex Evolution algorithm for application with multiple processors",
+                     kAlgorithmKeyword};
+}
+
 SearchSummary OptimisationTask::search(const TaskContext& context) const {
   UniformGenerator random(randomSeed);
   SearchProblem problem{searchBounds(context.space), stopping, initialSample, {}, context.evaluator, random};
-  problem.earlierSearches = earlierSearches;
+  problem.earlierSearches = earlierSearches_;
   if (method->facts().drawsInitialSample && initialSample.generation == SampleGeneration::fromFile) {
     problem.givenSample = loadInitialSample(initialSample.fileName, context.space);
   }
@@ -183,8 +190,7 @@ SearchSummary OptimisationTask::search(const TaskContext& context) const {
 }
 
 TaskOutcome OptimisationTask::run(const TaskContext& context) {
-  const bool isKnownUse = surrogateUse == SurrogateUse::no || surrogateUse == SurrogateUse::yes;
-  if (!isKnownUse || !method) return {std::string(kEndOfTask)};
+  if (surrogateUse != SurrogateUse::no && surrogateUse != SurrogateUse::yes) return {std::string(kEndOfTask)};
 
   const SearchSummary summary = search(context);
   context.log.line("");
@@ -201,7 +207,6 @@ TaskOutcome OptimisationTask::run(const TaskContext& context) {
 
 TaskReport OptimisationTask::report() const {
   TaskReport report;
-  if (!method) return report;
   report.algorithm = method->facts().name.name;
   report.populationSize = static_cast<int>(method->populationSize());
   if (usesSurrogate()) report.surrogate = surrogateModelName(surrogate);
@@ -209,7 +214,7 @@ TaskReport OptimisationTask::report() const {
 }
 
 std::optional<RaisedBudget> OptimisationTask::raisedBudget(const SearchHistory& history) const {
-  if (!method || stopping.maxEvaluations <= history.budget) return std::nullopt;
+  if (stopping.maxEvaluations <= history.budget) return std::nullopt;
   return method->raiseBudget(history, stopping, initialSample);
 }
 

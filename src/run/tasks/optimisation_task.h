@@ -8,7 +8,7 @@
 
 namespace mirevo {
 
-/// Any other number runs no search.
+/// Any other number: no search is run.
 enum class SurrogateUse : std::int32_t { no = 0, yes = 1 };
 
 /// Parameter optimisation by one of the searches, with or without a surrogate model.
@@ -23,12 +23,14 @@ class OptimisationTask final : public Task {
   int plannedEvaluations(std::size_t /*variableCount*/) const override { return stopping.maxEvaluations; }
   bool hasFinalRun() const override { return true; }
   bool drawsRandomNumbers() const override { return true; }
-  bool runsInParallel() const override { return method && method->facts().runsInParallel; }
+  std::optional<OneSlotOnly> needsOneSlot() const override;
   TaskOutcome run(const TaskContext& context) override;
   TaskReport report() const override;
   std::optional<RaisedBudget> raisedBudget(const SearchHistory& history) const override;
+  void continueFrom(std::vector<EarlierSearch> searches) override { earlierSearches_ = std::move(searches); }
+  std::vector<EarlierSearch> earlierSearches() const override { return earlierSearches_; }
 
-  std::unique_ptr<SearchMethod> method;  ///< nullptr where the setup names none
+  std::unique_ptr<SearchMethod> method;  ///< nullptr until it is read
   SurrogateUse surrogateUse = SurrogateUse::no;
   InitialSampleSettings initialSample;
   StoppingCriteria stopping;
@@ -36,11 +38,13 @@ class OptimisationTask final : public Task {
 
  private:
   /// Whether a surrogate model assists the search.
-  bool usesSurrogate() const { return surrogateUse == SurrogateUse::yes && method && method->facts().usesSurrogate; }
-  void readMethod(const TaskReading& reading, const SetupSection& section);
+  bool usesSurrogate() const { return surrogateUse == SurrogateUse::yes && method->facts().usesSurrogate; }
+  void readMethod(const TaskReading& reading, const SetupSection& section) const;
   void readStopping(const SetupSection& section);
   void readSurrogate(const TaskReading& reading, const SetupSection& section, const SetupSection& stoppingSection);
   SearchSummary search(const TaskContext& context) const;
+
+  std::vector<EarlierSearch> earlierSearches_;
 };
 
 }  // namespace mirevo

@@ -46,7 +46,7 @@ const SettingSection<ScenarioRun>& runSection() {
   return section;
 }
 
-/// The values of one run against the parameters.
+/// Checks the values of one run against the parameters.
 void validateScenarioRun(std::span<const double> values, std::span<const ModelParameter> parameters,
                          const SetupSection& section) {
   if (values.size() != parameters.size()) {
@@ -68,7 +68,7 @@ void validateScenarioRun(std::span<const double> values, std::span<const ModelPa
 }  // namespace
 
 const TaskFacts& ScenarioTask::facts() const {
-  static constexpr TaskFacts kFacts{{0, "scenarios"}, run_files::kPlain};
+  static constexpr TaskFacts kFacts{{0, "scenarios"}, "scenario runs", run_files::kPlain};
   return kFacts;
 }
 

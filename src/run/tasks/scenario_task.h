@@ -29,9 +29,9 @@ class ScenarioTask final : public Task {
   ScenarioSettings settings;
 };
 
-/// The parameter sets of the runs: of each run's values those of the variable parameters, transformed. Mapping them
+/// The parameter sets of the runs: the values of the variable parameters, transformed to the search scale. Mapping them
 /// back yields the given values to within the rounding of exp(ln(x)) for a logarithmic parameter, exactly for an
-/// untransformed one, and the grid value for an integer one. Throws FatalError naming run and parameter where a value
+/// untransformed one, and the grid value for an integer one. Throws FatalError naming run and parameter if a value
 /// cannot be transformed.
 std::vector<ParameterSet> scenarioSets(std::span<const ScenarioRun> runs, std::span<const ModelParameter> parameters);
 

@@ -31,13 +31,13 @@ const SettingSection<SensitivityTask>& sensitivitySection() {
   return section;
 }
 
-/// That every parameter has room for its perturbation within its bounds.
+/// Refuses the setup unless every parameter has room for its perturbation within its bounds.
 void validateLocalSensitivity(const SensitivitySettings& settings, std::span<const ModelParameter> parameters,
                               const SetupSection& section) {
   const SearchSpace space = BuildSearchSpace(parameters);
   std::size_t j = 0;
   for (const ModelParameter& parameter : parameters) {
-    // A perturbation that would leave the range is taken the other way, so that both must fail.
+    // A perturbation that would leave the bounds is made in the other direction, so only both together are refused.
     if (parameter.parameterType != ParameterType::variable || hasRoomForStep(settings, space, j++)) continue;
     section.refuse(
         fmt::format("Error: Perturbed value for parameter {} in local sensitivity analysis out of bounds",
@@ -50,7 +50,7 @@ void validateLocalSensitivity(const SensitivitySettings& settings, std::span<con
   }
 }
 
-/// What the covariance is computed from: one entry an observation, and one row of simulated values a set.
+/// The data of the covariance: one entry per observation, and one row of simulated values per parameter set.
 struct ComparedValues {
   std::vector<double> observed;  ///< NaN for an observation that does not count
   std::vector<ObservationLabel> labels;
@@ -58,8 +58,8 @@ struct ComparedValues {
   std::vector<std::vector<double>> simulated;  ///< empty for a set that failed
 };
 
-/// Every pair of series that an objective function is made of, once, however many measures compare it. An observation
-/// has the square of the weight that its measure gives to its difference: that is how it enters a sum of squares.
+/// Every pair of series that enters an objective function, once, however many measures compare it. The weight of an
+/// observation is the square of the measure's weight for its difference, as in a sum of squares.
 ComparedValues compareSeries(const TaskContext& context, std::span<const EvaluationResult> results) {
   const std::span<const OutputMeasure> measures = context.measures;
   ComparedValues compared;
@@ -95,7 +95,7 @@ ComparedValues compareSeries(const TaskContext& context, std::span<const Evaluat
   return compared;
 }
 
-/// Adds the covariance to what the analysis found.
+/// Adds the covariance analysis to the outcome.
 void addCovariance(const TaskContext& context, const LocalSensitivity& sensitivity, TaskOutcome& outcome) {
   outcome.report.emplace_back();
   if (!sensitivity.results.front().ok()) {
@@ -123,7 +123,7 @@ void addCovariance(const TaskContext& context, const LocalSensitivity& sensitivi
 }  // namespace
 
 const TaskFacts& SensitivityTask::facts() const {
-  static constexpr TaskFacts kFacts{{1, "sensitivity"}, run_files::kSensitivity};
+  static constexpr TaskFacts kFacts{{1, "sensitivity"}, "sensitivity analysis", run_files::kSensitivity};
   return kFacts;
 }
 
@@ -151,7 +151,6 @@ int SensitivityTask::plannedEvaluations(std::size_t variableCount) const {
 
 TaskOutcome SensitivityTask::run(const TaskContext& context) {
   TaskOutcome outcome{std::string(kEndOfTask)};
-  if (type != SensitivityType::local) return outcome;
   const LocalSensitivity sensitivity = localSensitivity(settings, context.space, context.evaluator);
   const AnalysisNames names = analysisNames(context);
   outcome.report = formatSensitivity(sensitivity, names);

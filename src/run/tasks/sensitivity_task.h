@@ -7,7 +7,7 @@ namespace mirevo {
 
 enum class SensitivityType : std::int32_t { local = 0 };
 
-/// Local sensitivity analysis, with the covariance of the parameters where the setup asks for it.
+/// Local sensitivity analysis, with the covariance of the parameters if the setup asks for it.
 class SensitivityTask final : public Task {
  public:
   const TaskFacts& facts() const override;

@@ -10,4 +10,6 @@ std::optional<RaisedBudget> Task::raisedBudget(const SearchHistory& /*history*/)
   return std::nullopt;
 }
 
+void Task::continueFrom(std::vector<EarlierSearch> /*searches*/) {}
+
 }  // namespace mirevo

@@ -3,6 +3,7 @@
 #include <cstdint>
 #include <functional>
 #include <memory>
+#include <optional>
 #include <span>
 #include <string>
 #include <string_view>
@@ -25,23 +26,24 @@ namespace mirevo {
 
 struct SensitivitySettings;
 
-/// What is always true of a task, whatever its settings.
+/// What is true of a task whatever its settings.
 struct TaskFacts {
-  CodeName name;  ///< in setups; the name also tells reports which task it is: "optimisation"
+  CodeName name;              ///< in setups; the name is also used in the run record and the report: "optimisation"
+  std::string_view longName;  ///< "parameter optimisation"
   ResultFileNames resultFiles;
 };
 
-/// What a task may look at while it reads its sections.
+/// What a task may use while it reads its sections.
 struct TaskReading {
   const SetupSection& target;
   std::span<const ModelParameter> parameters;
   std::span<const SetupSection> parameterSections;  ///< one per parameter
   std::size_t variableCount = 0;
-  /// Refuses an aggregation method whose scales neither the setup nor an initial sample can give.
+  /// Refuses an aggregation method whose scales are neither given in the setup nor determined from an initial sample.
   std::function<void(bool hasInitialSample)> requireScales;
 };
 
-/// What a task works with when it runs.
+/// What a task uses when it runs.
 struct TaskContext {
   const SearchSpace& space;
   std::span<const ModelParameter> parameters;
@@ -49,10 +51,10 @@ struct TaskContext {
   std::span<const ObjectiveFunction> objectives;
   Evaluator& evaluator;
   RunLog& log;
-  /// Told what a search has found, before the final model run repeats its best parameter set. May be empty.
+  /// Called with what a search has found, before the final model run repeats its best parameter set. May be empty.
   std::function<void(const SearchSummary&)> searchEnded = {};
-  std::string filePrefix = {};  ///< folder and name of the setup: the names of the run's files begin with it
-  /// The observations whose simulated values the results hold; needed where the task keepsSimulatedValues().
+  std::string filePrefix = {};  ///< folder and name of the setup: the beginning of the paths of the run's files
+  /// The observations whose simulated values the results hold; needed if the task keepsSimulatedValues().
   std::span<const ObservedSeries> observedSeries = {};
 };
 
@@ -65,22 +67,28 @@ struct TaskFile {
 /// How a task ended and what it found.
 struct TaskOutcome {
   std::string terminationMessage;
-  std::vector<std::string> report = {};  ///< for people, at the end of the result file; the log has it already
+  std::vector<std::string> report = {};  ///< for people, at the end of the result file; already in the log
   std::vector<DataTable> tables = {};    ///< for programs, one file each
   std::vector<TaskFile> files = {};
 };
 
 /// What a report shows of a task besides its evaluations.
 struct TaskReport {
-  std::string algorithm = {};                        ///< of a search: "DDS"
+  std::string algorithm = {};                        ///< the name of the search: "DDS"; empty: none
   std::string surrogate = {};                        ///< the surrogate model that assists it; empty: none
   int populationSize = 0;                            ///< 0: none
-  bool hasBands = false;                             ///< of simulated series
-  const SensitivitySettings* sensitivity = nullptr;  ///< of a local sensitivity analysis
+  bool hasBands = false;                             ///< it writes bands of simulated series
+  const SensitivitySettings* sensitivity = nullptr;  ///< for a local sensitivity analysis, else null
 };
 
-/// A task together with its settings: everything that a setup, a run, a restart or a report asks about it. One form per
-/// task, in a file pair of its own; tasks.h lists them.
+/// Why more than one slot is refused.
+struct OneSlotOnly {
+  std::string_view refusal;  ///< the fixed text
+  std::string_view keyword;  ///< the keyword whose value requires one slot
+};
+
+/// A task together with its settings: everything that a setup, a run, a restart or a report asks about it. One class
+/// per task, in a file pair of its own; tasks.cpp lists them.
 class Task {
  public:
   Task() = default;
@@ -93,7 +101,7 @@ class Task {
   virtual std::vector<const SectionRow*> sections() const = 0;
   /// Reads and checks its sections. Throws FatalError.
   virtual void read(const TaskReading& reading) = 0;
-  /// Whether it calls requireScales() itself, because it may have an initial sample.
+  /// Whether it may have an initial sample; if so, read() calls requireScales().
   virtual bool mayHaveInitialSample() const { return false; }
 
   /// "Parameter optimisation: Dynamically Dimensioned Search"
@@ -101,32 +109,33 @@ class Task {
   /// Further lines for the summary of the setup.
   virtual std::vector<std::string> summaryLines(std::size_t variableCount) const;
 
-  /// Evaluations that are planned, of n variable parameters; they size the failed-run limit.
+  /// Number of planned evaluations, on which the failed-run limit is based.
   virtual int plannedEvaluations(std::size_t variableCount) const = 0;
   /// Whether a final model run repeats the best parameter set.
   virtual bool hasFinalRun() const { return false; }
   /// Whether the results depend on the random seed.
   virtual bool drawsRandomNumbers() const { return false; }
-  /// Whether it works with simulated values at the observation times, which the results then have to hold.
+  /// Whether it uses the simulated values at the observation times, which the results then must hold.
   virtual bool keepsSimulatedValues() const { return false; }
-  /// Whether its batches fill several slots; where they do not, more than one is refused.
-  virtual bool runsInParallel() const { return true; }
+  /// Empty if its batches fill several slots.
+  virtual std::optional<OneSlotOnly> needsOneSlot() const { return std::nullopt; }
 
   /// Runs it. Throws FatalError and RunCancelled.
   virtual TaskOutcome run(const TaskContext& context) = 0;
 
   virtual TaskReport report() const { return {}; }
 
-  /// Of a search, what becomes of an earlier one with a smaller budget; nothing where the budget was not raised.
+  /// For a search, what becomes of an earlier one with a smaller budget; empty if the budget was not raised.
   virtual std::optional<RaisedBudget> raisedBudget(const SearchHistory& history) const;
+  /// Tells a search which searches with smaller budgets, made by the earlier run, it continues.
+  virtual void continueFrom(std::vector<EarlierSearch> searches);
+  virtual std::vector<EarlierSearch> earlierSearches() const { return {}; }
 
-  /// Of a search that continues others with smaller budgets; not from the setup but from the run that is continued.
-  std::vector<EarlierSearch> earlierSearches;
-  /// Of the initial sample and of the uncertainty analysis: one setting.
+  /// One setting for the initial sample and the uncertainty analysis.
   std::int32_t randomSeed = 1;
 };
 
-/// How a task ends that has nothing else to say.
+/// The termination message of a task that has none of its own.
 inline constexpr std::string_view kEndOfTask = progress::kNormalTermination;
 
 }  // namespace mirevo

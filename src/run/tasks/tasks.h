@@ -1,18 +1,11 @@
 #pragma once
 
-#include <memory>
-#include <span>
-#include <vector>
-
+#include "common/settings/choice_table.h"
 #include "run/tasks/task.h"
 
 namespace mirevo {
 
-/// The names of all tasks, those with a number first.
-std::span<const CodeName> taskNames();
-/// The task of that number or name, with the default settings; nullptr when there is none.
-std::unique_ptr<Task> makeTask(const SetupValue& value);
-/// Every task once, for the manual.
-std::vector<std::unique_ptr<Task>> allTasks();
+/// All tasks.
+const ChoiceTable<Task>& tasks();
 
 }  // namespace mirevo

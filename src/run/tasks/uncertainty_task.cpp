@@ -8,7 +8,7 @@
 namespace mirevo {
 namespace {
 
-/// The band of each series as a file, and a line each for the report.
+/// Adds the band of each series to `files` and returns one line on each for the report.
 std::vector<std::string> reportBands(const TaskContext& context, std::span<const EvaluationResult> results,
                                      std::vector<TaskFile>& files) {
   std::vector<std::string> lines;
@@ -31,7 +31,7 @@ std::vector<std::string> reportBands(const TaskContext& context, std::span<const
 }  // namespace
 
 const TaskFacts& UncertaintyTask::facts() const {
-  static constexpr TaskFacts kFacts{{3, "uncertainty"}, run_files::kPlain};
+  static constexpr TaskFacts kFacts{{3, "uncertainty"}, "uncertainty analysis", run_files::kPlain};
   return kFacts;
 }
 

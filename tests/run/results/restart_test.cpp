@@ -165,7 +165,7 @@ TEST_F(EarlierRunTest, ARaisedBudgetOfDdsIsAnotherSearch) {
                {20, 10, {{10, 10}}, {10}}};     // the second search had not begun
   for (const auto& c : cases) {
     RunConfig then = config(c.then);
-    then.task->earlierSearches = c.before;
+    then.task->continueFrom(c.before);
     std::string some;
     for (int number = 1; number <= c.count; ++number) some += row(number);
     taken(then, config(40), some);
@@ -229,7 +229,7 @@ TEST(SimulatedValuesFile, KeepsWholeRecordsOfTheEvaluationsThatCount) {
   EXPECT_THAT(SimulatedValuesFile(folder / "v.bin", 3).takeUp({1, 2, 3}), IsEmpty()) << "of other series";
 }
 
-TEST(FailedRunFile, IsTakenUpWithTheFailuresThatCount) {
+TEST(FailedRunFile, IsContinuedWithTheFailuresThatCount) {
   const TemporaryFolder folder;
   const FailedRunPaths paths{folder / "calSimErr.dat", folder / "basin_Failures.dat"};
   const auto fail = [](int number, std::vector<std::string> output = {}) {
@@ -249,13 +249,22 @@ TEST(FailedRunFile, IsTakenUpWithTheFailuresThatCount) {
   const std::string told = folder.read("calSimErr.dat");
   const std::string table = folder.read("basin_Failures.dat");
   folder.write("basin_Failures.dat", table + "11\ttimedOut\twhy\t");  // cut off
+  const auto goOn = [&](FailedRunFile& file, const std::set<int>& numbers) {
+    auto earlier = file.readEarlier(numbers);
+    std::map<int, std::vector<double>> sets;
+    for (const int number : numbers) sets[number] = values;
+    file.continueBehind(earlier.rows, sets);
+    return earlier;
+  };
   FailedRunFile file(paths, "basin", {"k"}, {"Title"});
-  const auto failures = file.takeUp({{2, values}, {5, values}, {6, values}, {11, values}});
-  ASSERT_THAT(failures, ElementsAre(testing::Key(2), testing::Key(5), testing::Key(6)));
-  EXPECT_EQ(failures.at(5).kind, EvaluationFailure::Kind::timedOut);
-  EXPECT_EQ(failures.at(5).reason, "why\n\"of\"\t#5");
-  EXPECT_EQ(failures.at(5).lastOutput, output);
-  EXPECT_THAT(failures.at(6).lastOutput, ElementsAre(""));
+  const auto earlier = goOn(file, {2, 5, 6});
+  ASSERT_EQ(earlier.rows.size(), 3U);
+  EXPECT_EQ(earlier.unknown, 0U);
+  EXPECT_EQ(earlier.rows[1].number, 5);
+  EXPECT_EQ(earlier.rows[1].failure.kind, EvaluationFailure::Kind::timedOut);
+  EXPECT_EQ(earlier.rows[1].failure.reason, "why\n\"of\"\t#5");
+  EXPECT_EQ(earlier.rows[1].failure.lastOutput, output);
+  EXPECT_THAT(earlier.rows[2].failure.lastOutput, ElementsAre(""));
   // Both files go on as if the evaluation that is made again had not been there.
   file.add(values, fail(9, output));
   const auto moved = [](const std::string& text, std::size_t from, std::size_t to) {
@@ -265,13 +274,16 @@ TEST(FailedRunFile, IsTakenUpWithTheFailuresThatCount) {
             moved(told, told.find("\nEvaluation No. 9"), told.find("\nEvaluation No. 5")));
   EXPECT_EQ(folder.read("basin_Failures.dat"), moved(table, table.find("\n9\t") + 1, table.find("\n5\t") + 1));
 
+  EXPECT_EQ(folder.read("calSimErr.1.dat"), told) << "what is made again is not lost";
+
   folder.write("calSimErr.dat", "# Failed evaluations of another\n");
-  EXPECT_THAT(FailedRunFile(paths, "basin", {"k"}, {"Title"}).takeUp({{2, values}}), ElementsAre(testing::Key(2)));
-  EXPECT_TRUE(folder.exists("calSimErr.1.dat")) << "another setup's evidence is kept";
-  EXPECT_THAT(folder.read("calSimErr.dat"), HasSubstr("\nEvaluation No. 2 (batch ran too long)\n   why \"of\"\t#2\n"));
-  std::filesystem::remove(paths.table);  // of a version of the program that left none
-  EXPECT_THAT(FailedRunFile(paths, "basin", {"k"}, {"Title"}).takeUp({{2, values}}), IsEmpty());
-  EXPECT_TRUE(folder.exists("calSimErr.2.dat"));
+  std::filesystem::remove(paths.table);
+  FailedRunFile other(paths, "basin", {"k"}, {"Title"});
+  EXPECT_EQ(goOn(other, {2}).unknown, 1U);
+  EXPECT_EQ(folder.read("calSimErr.2.dat"), "# Failed evaluations of another\n");
+  EXPECT_THAT(folder.read("calSimErr.dat"),
+              HasSubstr("\nEvaluation No. 2 (reason not known any more)\n   failed in the earlier run\n"));
+  EXPECT_EQ(goOn(other, {2}).unknown, 0U);
 }
 
 }  // namespace

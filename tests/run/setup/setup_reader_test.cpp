@@ -5,6 +5,7 @@
 #include <fmt/format.h>
 #include <gmock/gmock.h>
 
+#include "algorithms/searches/population_method.h"
 #include "matchers.h"
 #include "run/setup_fixture.h"
 #include "run/tasks/optimisation_task.h"
@@ -31,7 +32,7 @@ TEST_F(SetupReaderTest, FillsTheConfigurationOfAnOptimisation) {
   EXPECT_EQ(config.measureFile, folder_ / "model/measures.txt");
   const auto& task = dynamic_cast<const OptimisationTask&>(*config.task);
   EXPECT_EQ(task.method->populationSize(), 20);
-  EXPECT_EQ(task.method->simplex.pointCount, 5);
+  EXPECT_EQ(dynamic_cast<const PopulationMethod&>(*task.method).simplex.pointCount, 5);
 }
 
 TEST_F(SetupReaderTest, RefusesWhatCannotBeReadAndSaysWhere) {
@@ -48,9 +49,10 @@ TEST_F(SetupReaderTest, RefusesWhatCannotBeReadAndSaysWhere) {
        "19:3: TqSEKdxListItemCount: the keyword is missing in section MODEL_PARAMETERS"},
       {"TqSEKdxListItemCount = 3 => -3", "MODEL_PARAMETERS",
        "20:5: TqSEKdxListItemCount: expected 0 or more, found -3"},
-      {"Option = 2 => 2.0", "MIREVO_SIMULATION_OPTION", "3:14: Option: expected an integer within 32 bits, found 2.0"},
-      {"Option = 2 => 2147483648", "MIREVO_SIMULATION_OPTION",
-       "3:14: Option: expected an integer within 32 bits, found 2147483648"},
+      {"Max_No_Evaluations = 500 => 2.0", "STOPPING_CRITERIA",
+       "146:28: Max_No_Evaluations: expected an integer within 32 bits, found 2.0"},
+      {"Max_No_Evaluations = 500 => 2147483648", "STOPPING_CRITERIA",
+       "146:28: Max_No_Evaluations: expected an integer within 32 bits, found 2147483648"},
       {"Option = 2 => 2, 3", "MIREVO_SIMULATION_OPTION", "3:17: Option: expected one value, found 2"},
       {"'Upper catchment   ' => 2001-01-31", "MIREVO_SIMULATION_OPTION",
        "4:13: Title: expected a text between quotes, found the date 2001-01-31 00:00"},

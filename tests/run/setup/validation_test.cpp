@@ -2,6 +2,7 @@
 
 #include <cctype>
 #include <cmath>
+#include <tuple>
 #include <utility>
 
 #include <fmt/format.h>
@@ -68,7 +69,7 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
       {"Function_Name = 'Flow' => 'Flwo'", "Invalid function name for output measure Flow error",
        "Function_Name: no objective function is called \"Flwo\""},
       {"TqSEKdxListItemCount = 1\n      [OBJECTIVE_1] => 2\n      [OBJECTIVE_1] & [/OBJECTIVE_1] => "
-       "[/OBJECTIVE_1][OBJECTIVE_2]\nName = 'Flow'\n[/OBJECTIVE_2]",
+       "[/OBJECTIVE_1][OBJECTIVE_2]\nName = 'Flow'\nStandard_Deviation = 0.0\n[/OBJECTIVE_2]",
        "Invalid objective function name Flow. Name used more than once.", "setup.kdx:95:8"},
       {"TqSEKdxListItemCount = 1\n      [OBJECTIVE_1] => 0\n      [OBJECTIVE_1]", "No objective functions defined",
        "found 0"},
@@ -91,7 +92,7 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
        "Perturbed value for parameter Depth in local sensitivity analysis out of bounds",
        "0.75 of the range, from 412.5, leaves the bounds 100 to 900 both ways (logarithms)"},
       {"Upper_Bound = 1.0 => 0.31 & Lower_Bound = 0.0 => 0.31", "Lower bound equal to upper bound for parameter Rate",
-       "Parameter_Type = 1 fixes a parameter"},
+       "expected more than 0.31 for a search by SCE or PSE; Parameter_Type = 1 fixes a parameter"},
       {"Algorithm_Type = 1 => 0 & No_Points_Subcomplex = 6 => 8",
        "No. of points in a subcomplex in SCE algorithm invalid", "at most the 7 points of a complex, found 8"},
       {"No_Points_Simplex = 5 => 21", "No. of points in a simplex in PSE algorithm invalid", "at most the 20 points"},
@@ -102,13 +103,14 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
       {"'sample.txt' => '/dev/zero'", "Unable to open /dev/zero", "Not a regular file"},
       {"'sample.txt' => ''", "Unable to open ", "expected the name of a file, found a blank text"},
       {"'sample.txt' => 'none.txt'", "Unable to open none.txt", "No such file"},
-      {"Neighbourhood_Size = 60 => 5", "Invalid neighbourhood size for surrogate modelling optimisation",
+      {"Neighbourhood_Size = 60 => 5 & Sampling_rate = 30 => 0",
+       "Invalid neighbourhood size for surrogate modelling optimisation",
        "at least the 6 coefficients of a quadratic polynomial in 2 parameters, or 0"},
       {"Neighbourhood_Size = 60 => 61",
        "Population size and/or initial No. of generations too small for surrogate modelling optimisation",
        "Neighbourhood_Size = 61 evaluated sets before the surrogate is fitted, found 60"},
       {"Algorithm_Type = 1 => 2", "Use Population Simplex Evolution algorithm for application with multiple processors",
-       "found 4"},
+       "expected 1 with this Algorithm_Type, found 4"},
       {"Algorithm_Type = 1 => 0", "Use Population Simplex Evolution algorithm for application with multiple processors",
        ""},
       // Scale and location that nothing can give
@@ -242,16 +244,27 @@ TEST_F(ValidationTest, CodesAreTakenByNumberOrByName) {
       EXPECT_EQ(logOfText(byName), logOfText(byNumber));
       ++compared;
     }
-    const std::string error = failureOf(withValue(text, section->path, row->name(), "'nonesuch'"));
-    EXPECT_THAT(error, StartsWith("Error: Unable to read keyword in section "));
-    EXPECT_THAT(error, HasSubstr(fmt::format("{}: expected an integer within 32 bits or one of the names '{}'",
-                                             row->name(), row->facts.codes.front().name)));
+    for (const auto& [wrong, message, verb] :
+         {std::tuple{"'nonesuch'", "Error: Unable to read keyword in section ", ": expected"},
+          {"2.0", "Error: Unable to read keyword in section ", ": expected"},
+          {"nonesuch", "Error: Unable to open ", " takes"}}) {
+      const std::string error = failureOf(withValue(text, section->path, row->name(), wrong));
+      EXPECT_THAT(error, StartsWith(message));
+      EXPECT_THAT(error, HasSubstr(fmt::format("{}{} an integer within 32 bits or one of the names '{}'", row->name(),
+                                               verb, row->facts.codes.front().name)));
+    }
   }
   EXPECT_GT(compared, 40);
+  const std::string wanted =
+      "an integer within 32 bits or one of the names 'scenarios', 'sensitivity', 'optimisation', 'uncertainty', ";
   EXPECT_THAT(failure("Option = 2 => 'optimsation'"),
-              HasSubstr("setup.kdx:3:14: Option: expected an integer within 32 bits or one of the names 'scenarios', "
-                        "'sensitivity', 'optimisation', 'uncertainty', found the text \"optimsation\", did you mean "
-                        "'optimisation'?"));
+              HasSubstr("setup.kdx:3:14: Option: expected " + wanted +
+                        "found the text \"optimsation\", did you mean 'optimisation'?"));
+  EXPECT_THAT(failure("Option = 2 => 2.0"), HasSubstr("Option: expected " + wanted + "found 2.0"));
+  EXPECT_THAT(failure("Option = 2 => Optimisation  // a search"),
+              HasSubstr("setup.kdx:3:14: expected a number, a date or a text between quotes, found \"Optimisation\"; "
+                        "Option takes " +
+                        wanted + "did you mean 'optimisation'?"));
   EXPECT_THAT(logOf("Algorithm_Type = 1 => 'pse'"), HasSubstr("  Algorithm_Type = 1 ('PSE')\n"));
 }
 

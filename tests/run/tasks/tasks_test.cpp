@@ -11,7 +11,6 @@
 #include "refusal.h"
 #include "run/tasks/optimisation_task.h"
 #include "run/tasks/scenario_task.h"
-#include "run/tasks/sensitivity_task.h"
 
 namespace mirevo {
 namespace {
@@ -55,25 +54,21 @@ TEST_F(TasksTest, AScenarioValueWithoutALogarithmIsRefusedByRunAndParameter) {
   EXPECT_TRUE(evaluator_.batches.empty());
 }
 
-TEST_F(TasksTest, WhatDoesNotExistRunsNothingAndEndsNormally) {
-  SensitivityTask sensitivity;
-  sensitivity.type = SensitivityType{1};
-  EXPECT_EQ(run(sensitivity), "Normal termination");
+TEST_F(TasksTest, AnUnknownUseOfASurrogateModelRunsNothingAndEndsNormally) {
   OptimisationTask optimisation;
-  EXPECT_EQ(run(optimisation), "Normal termination") << "no search has the number";
-  optimisation.method = makeSearchMethod(SetupValue(2));
+  optimisation.method = searchMethods().make(SetupValue(2));
   optimisation.surrogateUse = SurrogateUse{2};
   EXPECT_EQ(run(optimisation), "Normal termination");
   EXPECT_TRUE(evaluator_.batches.empty());
 }
 
 TEST_F(TasksTest, AfterEverySearchItsBestSetIsTheFinalModelRun) {
-  for (const CodeName& name : searchNames()) {
+  for (const CodeName& name : searchMethods().names()) {
     std::vector<std::vector<ParameterSet>> alone;
     for (const SurrogateUse use : {SurrogateUse::no, SurrogateUse::yes}) {
       SCOPED_TRACE(::testing::Message() << name.name << " " << static_cast<int>(use));
       OptimisationTask task;
-      task.method = makeSearchMethod(SetupValue(std::string(name.name)));
+      task.method = searchMethods().make(SetupValue(std::string(name.name)));
       task.surrogateUse = use;
       task.stopping = {.maxEvaluations = 90, .minChange = 0.0};
       task.surrogate.neighbourhoodSize = 20;

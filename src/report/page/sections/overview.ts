@@ -1,4 +1,4 @@
-// The head of the report and its tables: what was run, with what, and what came of it.
+// The head of the report and its tables: what was run, with which settings, and the results.
 import { variableParameters, type Parameter, type ReportData } from '../data';
 import { make, shorten, table } from '../dom';
 import { count, counted, duration, kMissing, number, percent } from '../format';
@@ -115,7 +115,7 @@ export function runSection(data: ReportData): Section {
   return { id: 'run', title: 'Run', content: [facts] };
 }
 
-// Where the start and the best value lie between the bounds, on the scale of the search.
+// The positions of the start and the best value between the bounds, on the search scale.
 function rangeBar(parameter: Parameter): Node | string {
   const best = placeBetweenBounds(parameter, parameter.best);
   const start = placeBetweenBounds(parameter, parameter.start);

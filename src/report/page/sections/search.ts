@@ -1,4 +1,4 @@
-// How the evaluations went: their progress, and what they say of each parameter.
+// The course of the search, and what the evaluations tell of each parameter.
 import { axis, chart, legend, tip, tooltip, type Chart, type ChartPlan } from '../chart';
 import { variableParameters, type Maybe, type Parameter, type ReportData } from '../data';
 import { choice, shorten } from '../dom';
@@ -128,7 +128,7 @@ export function dottySection(data: ReportData, title: string): Section | null {
   };
 }
 
-// Of few evaluations more than a tenth are taken.
+// If there are few evaluations, more than a tenth of them are shown.
 function nameOfGood(data: ReportData, good: number[]): string {
   const isShare = finite(data.evaluations.aggregate).length * kGoodShare > good.length - 1;
   return isShare ? `best tenth (${count(good.length)} sets)` : `${count(good.length)} best sets`;
@@ -186,7 +186,8 @@ function correlationPlan(data: ReportData, good: number[]): ChartPlan {
     'Values near \u00b11 say that two parameters make up for each other.');
 }
 
-// Spread of successive blocks as large as the population: the middle half of each parameter, as a share of its range.
+// Spread in successive blocks of the size of the population: the interquartile range of each parameter, as a share of
+// its range.
 function spreadPlan(data: ReportData, size: number): ChartPlan {
   const variable = variableParameters(data);
   const { parameters, numbers, ok } = data.evaluations;

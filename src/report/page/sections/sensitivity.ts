@@ -43,7 +43,7 @@ function rankedPlan({ parameters, ranking, composite }: Sensitivity): ChartPlan 
 
 const positiveOn = (log: boolean, value: Maybe) => (log && value !== null && value <= 0 ? null : value);
 
-// On the way from the lower to the upper bound, so that parameters of any size stand side by side.
+// As positions between the lower and the upper bound, so that parameters of any magnitude can be compared.
 function confidencePlan(data: ReportData, covariance: Covariance): ChartPlan {
   const rows = covariance.names.map((name, index) => {
     const parameter = data.parameters.find((candidate) => candidate.name === name);

@@ -1,4 +1,4 @@
-// Simulated against observed series: how well it fits, when it does not, and over which range of values.
+// Simulated against observed series: how well they fit, at which times they do not, and in which range of values.
 import { axis, chart, legend, timeZoom, tip, tooltip, type ChartPlan } from '../chart';
 import { timesOf, type Figures, type Maybe, type ReportData, type Series } from '../data';
 import { shorten, table } from '../dom';
@@ -40,7 +40,7 @@ function outside(times: number[], period: Series['period']): [number, number][] 
   return ([[first, period[0]], [period[1], last]] as [number, number][]).filter(([from, to]) => to > from);
 }
 
-// Areas outside the evaluation period, where nothing is judged.
+// Areas outside the evaluation period, where values do not count.
 function outsidePeriod(look: Look, times: number[], period: Series['period']): object {
   const areas = outside(times, period);
   return areas.length === 0 ? {} : { markArea: { silent: true, itemStyle: { color: look.rule, opacity: 0.45 }, data: areas.map(([from, to]) => [{ xAxis: from }, { xAxis: to }]) } };
@@ -161,7 +161,7 @@ function scatterPlan(data: ReportData, series: Series): ChartPlan {
   };
 }
 
-// Of a thinned series the curve of all its values comes with the data.
+// For a thinned series the data contain the curve of all its values.
 function givenCurve({ flowDuration }: Series, key: 'observed' | 'initial' | 'best'): [number, number][] | null {
   const values = flowDuration?.[key];
   if (!values) return null;

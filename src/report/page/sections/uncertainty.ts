@@ -1,4 +1,4 @@
-// What the samples of an uncertainty analysis say: distributions, and the band of every simulated series.
+// The results of an uncertainty analysis: distributions, and the band of every simulated series.
 import { axis, chart, legend, timeZoom, tip, tooltip, type ChartPlan } from '../chart';
 import { timesOf, variableParameters, type Band, type Maybe, type ReportData } from '../data';
 import { count, moment, number, percent } from '../format';
@@ -45,7 +45,7 @@ export interface CustomApi {
   coord: (point: number[]) => number[];
 }
 
-// A closed outline a stretch of values without gaps: along the upper edge and back along the lower.
+// One closed outline per stretch of values without gaps: along the upper edge and back along the lower.
 function bandOutlines(times: number[], low: Maybe[], high: Maybe[], places: number[]): number[][][] {
   const outlines: number[][][] = [];
   let run: number[] = [];
@@ -61,7 +61,7 @@ function bandOutlines(times: number[], low: Maybe[], high: Maybe[], places: numb
   return outlines;
 }
 
-// Of each stretch of `places` that falls on one pixel the widest reach of the band, so that no flood is thinned away.
+// The widest extent of the band over each stretch of times that falls on one pixel, so that thinning loses no flood.
 function widest(band: Band, from: number, to: number): { places: number[]; low: Maybe[]; high: Maybe[] } {
   const length = to - from;
   const edges = spaced(length, Math.min(length, kBandPoints)).map((index) => index + from);
@@ -111,7 +111,7 @@ function bandPlan(band: Band): ChartPlan {
         series: [
           {
             name: '5 to 95 %', type: 'custom', color: look.band, clip: true, tooltip: { show: false },
-            // One item draws the whole band, and its two corners tell the axes how far it reaches.
+            // One item draws the whole band; its two corners give the axes their extent.
             data: [[first, finite(shown.p5).reduce((a, b) => Math.min(a, b), Infinity)], [last, finite(shown.p95).reduce((a, b) => Math.max(a, b), -Infinity)]],
             renderItem: (info: { dataIndex: number; coordSys: { x: number; width: number } }, api: CustomApi & { size: (of: number[]) => number[] }) => {
               if (info.dataIndex > 0) return null;

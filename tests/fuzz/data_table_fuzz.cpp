@@ -1,0 +1,52 @@
+// What the program writes for programs and for a restart: any text is taken, and what was read is written and read back
+// the same.
+#include <cstdint>
+#include <cstdlib>
+#include <string_view>
+
+#include "common/data_table.h"
+#include "run/results/failure_table.h"
+#include "run/results/restart_settings.h"
+#include "run/results/run_record.h"
+#include "run/results/series_table.h"
+
+namespace {
+
+void require(bool isTrue) {
+  if (!isTrue) std::abort();
+}
+
+std::string tableText(const mirevo::ReadTable& read) {
+  mirevo::DataTable table{{}, read.headLines, read.columns, {}};
+  for (const auto& cells : read.rows) table.rows.emplace_back(cells.begin(), cells.end());
+  return mirevo::dataTableText(table);
+}
+
+std::string recordText(std::string_view text) {
+  const auto record = mirevo::readRunRecord(text);
+  return record ? mirevo::runRecordText(*record, {}) : std::string();
+}
+
+std::string failureText(std::string_view text) {
+  std::string rows = mirevo::failureTableHead({});
+  for (const mirevo::FailureRow& row : mirevo::readFailureTable(text)) rows += mirevo::failureRowText(row);
+  return rows;
+}
+
+}  // namespace
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+  const std::string_view text(reinterpret_cast<const char*>(data), size);
+  const mirevo::ReadTable table = mirevo::readDataTable(text);
+  if (table.columns.size() > 1) {
+    const mirevo::ReadTable again = mirevo::readDataTable(tableText(table));
+    require(again.columns == table.columns && again.rows == table.rows);
+  }
+  require(recordText(recordText(text)) == recordText(text));
+  require(failureText(failureText(text)) == failureText(text));
+  mirevo::readSeriesTable(text);
+  if (const auto settings = mirevo::parseRestartSettings(text)) {
+    require(mirevo::parseRestartSettings(mirevo::formatRestartSettings(*settings)).has_value());
+  }
+  return 0;
+}
