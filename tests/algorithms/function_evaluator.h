@@ -6,7 +6,7 @@
 
 #include "evaluation/evaluator.h"
 
-namespace mirevo::testing {
+namespace mirevo {
 
 /// Evaluates a function instead of a model, and keeps every batch for the test to look at.
 class FunctionEvaluator final : public Evaluator {
@@ -48,4 +48,4 @@ inline EvaluationResult failedResult() {
   return result;
 }
 
-}  // namespace mirevo::testing
+}  // namespace mirevo

@@ -1,20 +1,16 @@
 // What the program writes for programs and for a restart: any text is taken, and what was read is written and read back
 // the same.
 #include <cstdint>
-#include <cstdlib>
 #include <string_view>
 
 #include "common/data_table.h"
+#include "require.h"
 #include "run/results/failure_table.h"
 #include "run/results/restart_settings.h"
 #include "run/results/run_record.h"
 #include "run/results/series_table.h"
 
 namespace {
-
-void require(bool isTrue) {
-  if (!isTrue) std::abort();
-}
 
 std::string tableText(const mirevo::ReadTable& read) {
   mirevo::DataTable table{{}, read.headLines, read.columns, {}};

@@ -32,6 +32,7 @@ class ViewerTest : public ::testing::Test {
     viewer.type("y");
   }
   std::vector<std::string> attached() const { return {MIREVO_VIEWER, (folder_ / "basin.kdx")}; }
+
   const ModelFolder folder_;
 };
 

@@ -13,8 +13,6 @@
 namespace mirevo {
 namespace {
 
-using testing::FunctionEvaluator;
-
 /// Transformation, initial value and bounds on the search scale; an integer parameter's upper one above its largest
 /// value.
 using Parameter = std::tuple<TransformationType, double, double, double>;

@@ -14,9 +14,6 @@
 namespace mirevo {
 namespace {
 
-using testing::FunctionEvaluator;
-using testing::resultOf;
-
 double normalProbability(double z) {
   return 0.5 * std::erfc(-z / std::sqrt(2.0));
 }

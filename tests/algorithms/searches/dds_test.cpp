@@ -15,9 +15,6 @@
 namespace mirevo {
 namespace {
 
-using testing::FunctionEvaluator;
-using testing::resultOf;
-
 /// The given deviates in order; running past their end fails the test.
 DeviateSource scripted(std::vector<double> deviates) {
   return [deviates = std::move(deviates), next = std::size_t{0}]() mutable {

@@ -60,8 +60,7 @@ TEST(OptimisationDriver, EndsTheRunForAStatusOtherThanZeroInEitherStep) {
 
 TEST(OptimisationDriver, WarnsOnceOfANegativeBestValueOfTheSample) {
   for (const auto& [shift, warnings] : {std::pair{0.0, 0}, {-2.0, 1}}) {
-    testing::FunctionEvaluator evaluator(
-        [offset = shift](const ParameterSet& x) { return testing::resultOf(x[0] * x[0] + offset); });
+    FunctionEvaluator evaluator([offset = shift](const ParameterSet& x) { return resultOf(x[0] * x[0] + offset); });
     UniformGenerator random(1);
     std::vector<std::string> lines;
     SceMethod().run({{{-1}, {1}, {0.7}}, {400, 1000, 0.0}, {}, {}, evaluator, random},
@@ -75,7 +74,7 @@ TEST(OptimisationDriver, WarnsOnceOfANegativeBestValueOfTheSample) {
 }
 
 TEST(OptimisationDriver, SendsWhatTheSurrogateModelChoseInItsOwnMode) {
-  testing::FunctionEvaluator evaluator([](const ParameterSet& x) { return testing::resultOf(x[0] * x[0]); });
+  FunctionEvaluator evaluator([](const ParameterSet& x) { return resultOf(x[0] * x[0]); });
   UniformGenerator random(1);
   PseMethod method;
   method.settings.populationSize = 8;

@@ -21,9 +21,6 @@ namespace mirevo {
 namespace {
 
 using testing::boundsOf;
-using testing::failedResult;
-using testing::FunctionEvaluator;
-using testing::resultOf;
 
 enum class Kind { sce, pse };
 

@@ -18,8 +18,6 @@
 namespace mirevo {
 namespace {
 
-using testing::failedResult;
-using testing::resultOf;
 using Function = double (*)(const std::vector<double>&);
 
 std::vector<double> valuesOf(const UnitPoints& points, Function function) {

@@ -1,8 +1,8 @@
 #include "platform/series/netcdf_time_series.h"
 
-#include <array>
 #include <cstdio>
 #include <filesystem>
+#include <map>
 #include <numeric>
 #include <tuple>
 
@@ -30,15 +30,18 @@ class NetcdfFile final {
   NetcdfFile& operator=(const NetcdfFile&) = delete;
 
   const std::string& path() const { return path_; }
-  int dimension(const char* name, std::size_t length) const {
+  int dimension(const char* name, std::size_t length, bool isUnlimited = false) {
     int dimension = -1;
-    check(nc_def_dim(id_, name, length, &dimension));
+    check(nc_def_dim(id_, name, isUnlimited ? NC_UNLIMITED : length, &dimension));
+    lengths_[dimension] = length;
     return dimension;
   }
   int variable(const char* name, nc_type type, std::vector<int> dimensions, std::vector<double> values = {}) {
     int variable = -1;
     check(nc_def_var(id_, name, type, static_cast<int>(dimensions.size()), dimensions.data(), &variable));
-    values_.emplace_back(variable, std::move(values));
+    std::vector<std::size_t> shape;
+    for (const int dimension : dimensions) shape.push_back(lengths_.at(dimension));
+    values_.emplace_back(variable, std::move(shape), std::move(values));
     return variable;
   }
   void text(int variable, const char* name, const std::string& value) const {
@@ -54,11 +57,9 @@ class NetcdfFile final {
   }
   void close() const {
     nc_enddef(id_);  // an error where the format needs none
-    for (const auto& [variable, values] : values_) {
-      std::vector<std::size_t> start(3, 0);
-      std::vector<std::size_t> count = shapeOf(variable);
-      if (count[0] == 0) count[0] = values.size() / (count.size() > 1 ? count[1] : 1);  // of no fixed length
-      if (!values.empty()) check(nc_put_vara_double(id_, variable, start.data(), count.data(), values.data()));
+    for (const auto& [variable, shape, values] : values_) {
+      const std::vector<std::size_t> start(shape.size(), 0);
+      if (!values.empty()) check(nc_put_vara_double(id_, variable, start.data(), shape.data(), values.data()));
     }
     check(nc_close(id_));
   }
@@ -73,19 +74,12 @@ class NetcdfFile final {
   }
 
  private:
-  std::vector<std::size_t> shapeOf(int variable) const {
-    int count = 0;
-    std::array<int, NC_MAX_VAR_DIMS> dimensions{};
-    check(nc_inq_var(id_, variable, nullptr, nullptr, &count, dimensions.data(), nullptr));
-    std::vector<std::size_t> shape(static_cast<std::size_t>(count));
-    for (std::size_t i = 0; i < shape.size(); ++i) check(nc_inq_dimlen(id_, dimensions[i], &shape[i]));
-    return shape;
-  }
   static void check(int status) { ASSERT_EQ(status, NC_NOERR) << nc_strerror(status); }
 
   std::string path_;
   int id_ = -1;
-  std::vector<std::pair<int, std::vector<double>>> values_;
+  std::map<int, std::size_t> lengths_;                                                  ///< of the dimensions
+  std::vector<std::tuple<int, std::vector<std::size_t>, std::vector<double>>> values_;  ///< variable, shape, values
 };
 
 TEST(NetcdfTimeSeries, ReadsVariablesStationsAndPacking) {
@@ -193,10 +187,10 @@ TEST(NetcdfTimeSeries, FilesThatAreNoneOrCutOffAreRefused) {
 // The library reads zeros beyond the end of a classic file: a run that stopped half-way would count as a good one.
 TEST(NetcdfTimeSeries, AClassicFileThatWasNotWrittenToItsEndIsRefused) {
   for (const int format : {0, NC_64BIT_OFFSET, NC_64BIT_DATA}) {
-    for (const std::size_t timeLength : {std::size_t{3}, std::size_t{NC_UNLIMITED}}) {
+    for (const bool isUnlimited : {false, true}) {
       for (const bool hasTwo : {false, true}) {
         NetcdfFile file("classic.nc", format);
-        const int time = file.dimension("time", timeLength);
+        const int time = file.dimension("time", 3, isUnlimited);
         file.time(time, "days since 1990-01-01", {1, 2, 3});
         if (hasTwo) file.variable("level", NC_SHORT, {time}, {1, 2, 3});
         const int stations = file.dimension("station", 2);
@@ -209,7 +203,7 @@ TEST(NetcdfTimeSeries, AClassicFileThatWasNotWrittenToItsEndIsRefused) {
         EXPECT_EQ(series.itemCount(), hasTwo ? 3 : 2);
         for (const std::size_t left : {size - 1, size - 8, size - 40}) {
           std::filesystem::resize_file(file.path(), left);
-          EXPECT_FALSE(series.open(file.path())) << format << " " << timeLength << " " << left;
+          EXPECT_FALSE(series.open(file.path())) << format << " " << isUnlimited << " " << left;
           EXPECT_EQ(series.lastError(), file.path() + ": expected " + std::to_string(size) +
                                             " bytes as its header says, found " + std::to_string(left) +
                                             ": it was not written to its end");

@@ -31,7 +31,7 @@ class TasksTest : public ::testing::Test {
                                           parameter("d", ParameterType::variable, TransformationType::integer)};
   std::vector<ObjectiveFunction> objectives_{1};
   SearchSpace space_ = BuildSearchSpace(parameters_);
-  testing::FunctionEvaluator evaluator_{[](const ParameterSet& set) { return testing::resultOf(set.front()); }};
+  FunctionEvaluator evaluator_{[](const ParameterSet& set) { return resultOf(set.front()); }};
   RunLog log_;
 };
 
