@@ -61,7 +61,12 @@ fi)");
       const std::string progress = folder_.read("basin._spi_");
       ::kill(std::atoi(progress.c_str() + progress.find(", process ") + 10), SIGKILL);  // the master
       program.wait();
-      std::filesystem::remove_all(folder_ / "tickets");
+      // The guard ends what the master has started, which may make a ticket until then.
+      ASSERT_TRUE(waitUntil([&] {
+        std::error_code failed;
+        std::filesystem::remove_all(folder_ / "tickets", failed);
+        return !folder_.exists("tickets");
+      }));
     }
     run();
     EXPECT_EQ(results(), expected) << log();
