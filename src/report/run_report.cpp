@@ -204,6 +204,12 @@ void ReportBuilder::addSeries() {
     return;
   }
   data_.series = *std::move(source.content);
+  if (config_.task && !data_.series.task.empty() && data_.series.task != config_.task->facts().name.name) {
+    note(
+        fmt::format("Hydrographs are not shown: {} is of a run of another task ({}).", source.file, data_.series.task));
+    data_.series = {};
+    return;
+  }
   const std::vector<std::string> names = seriesNames(config_.measures, shown);
   std::vector<ShownSeries> series;
   for (std::size_t i = 0; i < shown.size(); ++i) {

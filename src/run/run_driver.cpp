@@ -199,6 +199,8 @@ void RunDriver::openSeries() {
   run.headLines = {
       columnName(config_.title), fmt::format("Mirevo {}", programVersion()), "Setup file: " + config_.setupFile,
       fmt::format("Evaluation period: {} to {}", formatDate(config_.period.start), formatDate(config_.period.end))};
+  const std::string task = config_.task ? std::string(config_.task->facts().name.name) : std::string();
+  run.task = task;
   run.measures = seriesNames(config_.measures, runner_->shownMeasures());
   run.observations = runner_->readShownObservations();
   run.periodFirst = secondNumber(config_.period.start);
@@ -213,7 +215,12 @@ void RunDriver::openSeries() {
     if (!earlier && std::filesystem::exists(path, ignored)) {
       state_.log.warning(fmt::format("The series of the earlier run are not taken up: {}: {}", path, reason));
     }
-    series_->resume(earlier.value_or(std::string{}));
+    const SeriesTable table = readSeriesTable(earlier.value_or(std::string{}));
+    if (table.task.empty() || table.task == task) {
+      series_->resume(table);
+    } else {
+      keepEarlierFile(path);  // of a run of another task in between
+    }
   }
   reporter_->recordSeries(*series_);
 }

@@ -18,7 +18,7 @@ export interface Run {
   planned: number | null;
   failed: number;
   aggregation: string | null;
-  algorithm: 'SCE' | 'PSE' | 'DDS' | null;
+  algorithm: string | null;
   surrogate: string | null;
   populationSize: number | null;
   period: [string, string] | null;

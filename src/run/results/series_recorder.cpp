@@ -38,8 +38,7 @@ SeriesRecorder::SeriesRecorder(std::string path, RecordedSeries run, std::functi
       warn_(std::move(warn)),
       initialChoice_(run_.initialValues) {}
 
-void SeriesRecorder::resume(std::string_view earlierFile) {
-  const SeriesTable table = readSeriesTable(earlierFile);
+void SeriesRecorder::resume(const SeriesTable& table) {
   const auto takeOver = [&](const std::optional<ShownEvaluation>& evaluation, std::vector<float> ShownSeries::*column) {
     std::optional<Held> held;
     if (!evaluation) return held;
@@ -128,6 +127,7 @@ void SeriesRecorder::write() {
   const double begun = clock_();
   SeriesTable table;
   table.headLines = run_.headLines;
+  table.task = run_.task;
   if (initial_) table.initial = initial_->evaluation;
   table.isOfInitialParameters = initialChoice_.hasSetupValues();
   if (best_) table.best = best_->evaluation;

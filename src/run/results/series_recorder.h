@@ -19,6 +19,7 @@ namespace mirevo {
 /// compared.
 struct RecordedSeries {
   std::vector<std::string> headLines;
+  std::string task;                        ///< its key
   std::vector<std::string> measures;       ///< names in the series file
   std::vector<PeriodSeries> observations;  ///< with one step before and after the period
   std::int64_t periodFirst = 0;            ///< secondNumber() of the ends of the period
@@ -36,7 +37,7 @@ class SeriesRecorder final {
                  std::function<void(std::string_view)> warn);
 
   /// Takes over the series that an earlier run of the same setup has recorded, as its evaluations are not repeated.
-  void resume(std::string_view earlierFile);
+  void resume(const SeriesTable& table);
 
   /// Takes a finished evaluation; `values` are on the model scale. `best` is the best of the run, including this one.
   void evaluationFinished(const EvaluationResult& result, std::span<const double> values,

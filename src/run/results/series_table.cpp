@@ -18,9 +18,18 @@ namespace {
 
 constexpr std::string_view kHeader = "Measure\tTime\tObserved\tInitial\tBest";
 
-/// The head lines that say which evaluations are shown: "Initial: evaluation 2, the first that succeeded, aggregate
-/// 0.1". The same constants serve for writing and reading. If a line is to change, these must still be read: a restart
-/// may find files of earlier versions.
+/// The head lines that say which evaluations are shown, with a tab before the value.
+namespace key {
+constexpr std::string_view kTask = "task";
+constexpr std::string_view kInitial = "initialEvaluation";
+constexpr std::string_view kInitialAggregate = "initialAggregate";
+constexpr std::string_view kHasInitialParameters = "hasInitialParameters";
+constexpr std::string_view kBest = "bestEvaluation";
+constexpr std::string_view kBestAggregate = "bestAggregate";
+}  // namespace key
+
+/// The same for people: "Initial: evaluation 2, the first that succeeded, aggregate 0.1". Files of earlier versions of
+/// the program have these alone, and a restart reads them as they were then.
 namespace head {
 constexpr std::string_view kInitial = "Initial: evaluation ";
 constexpr std::string_view kBest = "Best: evaluation ";
@@ -76,7 +85,38 @@ std::optional<float> readCell(std::string_view text) {
   return value;
 }
 
+ShownEvaluation& shown(std::optional<ShownEvaluation>& evaluation) {
+  return evaluation ? *evaluation : evaluation.emplace(ShownEvaluation{0, std::numeric_limits<double>::quiet_NaN()});
+}
+
+/// Takes a key and its value; false for a line that is none.
+bool readKey(std::string_view line, SeriesTable& table) {
+  const std::size_t tab = line.find('\t');
+  if (tab == std::string_view::npos) return false;
+  const std::string_view name = line.substr(0, tab);
+  const std::string_view value = line.substr(tab + 1);
+  const auto number = parseInteger(value);
+  const auto real = realCell(value);
+  if (name == key::kTask) {
+    table.task = std::string(value);
+  } else if (name == key::kInitial && number) {
+    shown(table.initial).number = *number;
+  } else if (name == key::kInitialAggregate && real) {
+    shown(table.initial).aggregate = *real;
+  } else if (name == key::kHasInitialParameters && number) {
+    table.isOfInitialParameters = *number == 1;
+  } else if (name == key::kBest && number) {
+    shown(table.best).number = *number;
+  } else if (name == key::kBestAggregate && real) {
+    shown(table.best).aggregate = *real;
+  } else {
+    return false;
+  }
+  return true;
+}
+
 void readHeadLine(std::string_view line, SeriesTable& table) {
+  if (readKey(line, table)) return;
   if (line.starts_with(head::kInitial)) {
     table.initial = head::read(line.substr(head::kInitial.size()));
     table.isOfInitialParameters = line.find(head::kOfSetup) != std::string_view::npos;
@@ -125,6 +165,19 @@ std::string seriesTableText(const SeriesTable& table) {
     text += head::line(head::kInitial, *table.initial, table.isOfInitialParameters ? head::kOfSetup : head::kOfFirst);
   }
   if (table.best) text += head::line(head::kBest, *table.best, {});
+  const auto add = [&text](std::string_view name, std::string_view value) {
+    text += fmt::format("# {}\t{}\n", name, value);
+  };
+  if (!table.task.empty()) add(key::kTask, table.task);
+  if (table.initial) {
+    add(key::kInitial, std::to_string(table.initial->number));
+    add(key::kInitialAggregate, formatReal(table.initial->aggregate));
+    add(key::kHasInitialParameters, table.isOfInitialParameters ? "1" : "0");
+  }
+  if (table.best) {
+    add(key::kBest, std::to_string(table.best->number));
+    add(key::kBestAggregate, formatReal(table.best->aggregate));
+  }
   text.append(kHeader).append("\n");
   for (const ShownSeries& series : table.series) {
     for (std::size_t i = 0; i < series.seconds.size(); ++i) {

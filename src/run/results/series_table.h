@@ -32,8 +32,8 @@ struct ShownSeries {
 /// The content of `<setup>_Series.dat`: the simulated series of a run's initial and its best evaluation beside the
 /// observed ones.
 struct SeriesTable {
-  std::vector<std::string> headLines;  ///< without "# "; except those on the evaluations, which are made from the
-                                       ///< members below
+  std::vector<std::string> headLines;  ///< without "# "; except those that are made from the members below
+  std::string task;                    ///< the key of the task that made them; empty in files of earlier versions
   std::optional<ShownEvaluation> initial;
   bool isOfInitialParameters = false;  ///< the initial one has the initial parameters; else it is the first that
                                        ///< succeeded

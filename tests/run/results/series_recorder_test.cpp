@@ -114,7 +114,7 @@ TEST_F(SeriesRecorderTest, GoesOnFromAnEarlierFileAndWarnsOnceWhereItCannotWrite
     earlier.finish(best_);
   }
   SeriesRecorder run = recorder();
-  run.resume(folder_.read("s_Series.dat"));
+  run.resume(readSeriesTable(folder_.read("s_Series.dat")));
   std::filesystem::remove(folder_ / "s_Series.dat");
   best_.reset();
   evaluate(run, 1, 5.0, true, -1.0, false);  // replayed

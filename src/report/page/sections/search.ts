@@ -235,8 +235,7 @@ export function progressSection(data: ReportData): Section | null {
   if (data.evaluations.count === 0 || finite(data.evaluations.aggregate).length === 0) return null;
   const charts: Node[] = [chart(progressPlan(data))];
   const size = data.run.populationSize;
-  const population = data.run.algorithm === 'SCE' || data.run.algorithm === 'PSE';
-  if (population && size !== null && size > 1 && data.evaluations.count >= 2 * size) charts.push(chart(spreadPlan(data, size)));
+  if (size !== null && size > 1 && data.evaluations.count >= 2 * size) charts.push(chart(spreadPlan(data, size)));
   return { id: 'progress', title: 'Progress', content: charts };
 }
 
