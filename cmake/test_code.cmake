@@ -18,4 +18,6 @@ function(mirevo_test_code target)
   target_link_libraries(${target} PRIVATE mirevo_test_main)
   target_compile_options(${target} PRIVATE $<$<CONFIG:Release>:-O0> -Wno-missing-field-initializers)
   target_precompile_headers(${target} REUSE_FROM mirevo_test_main)
+  # The files of a program are compiled as one: names in their anonymous namespaces must differ.
+  set_target_properties(${target} PROPERTIES UNITY_BUILD ON UNITY_BUILD_BATCH_SIZE 0)
 endfunction()

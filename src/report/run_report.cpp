@@ -221,6 +221,9 @@ void ReportBuilder::addSeries() {
     }
   }
   data_.series.series = std::move(series);
+  if (!data_.series.initial) {
+    note(fmt::format("The series of the initial evaluation are not shown: {} does not have them.", source.file));
+  }
   const std::optional<ShownEvaluation>& best = data_.series.best;
   if (best && best_ != nullptr && best->number != best_->number) {
     note(

@@ -66,6 +66,10 @@ std::optional<RunSources> readRunSources(const RunConfig& config, const SearchSp
   putInOrder(sources.results.rows);
   auto record = readRecord(runFilePath(filePrefix, names->record), sources.recordFault);
   const bool isGoingOn = RunLock::isHeld(config.setupFile);
+  if (record && !record->stage && !isGoingOn && !sources.results.closingLines.empty()) {
+    sources.recordFault = fileNameOf(runFilePath(filePrefix, names->record)) + ": it lacks its end";
+    record.reset();
+  }
   if (!record) {
     record = recordOfEarlierVersion(sources.results);
     if (isGoingOn) record->stage.reset();

@@ -333,6 +333,17 @@ void RunDriver::logFailures() {
   for (const std::string& line : reporter_->failures().lines()) state_.log.line(line);
 }
 
+/// Nothing that goes wrong here may hide why the run ended.
+void RunDriver::closeResultsOfEarlyEnd(const Ending& ending) {
+  try {
+    const auto unwritten = closeResults(ending);
+    if (!unwritten || ending.stage == RunStage::failed) return;  // the first reason counts
+    state_.log.line(fmt::format("Error: Unable to write to {}\n{}", unwritten->path, unwritten->reason));
+  } catch (const std::exception& error) {
+    state_.log.warning(std::string("The results may lack their end: ") + error.what());
+  }
+}
+
 int RunDriver::endInError(std::string_view message, std::string_view detail) {
   std::string text(trimTrailing(message));
   if (!text.empty()) {
@@ -345,11 +356,7 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
     state_.log.line(text);
     showMessage(text);
   }
-  try {
-    closeResults({RunStage::failed, std::string(message), text});  // the first reason counts
-  } catch (const std::exception& error) {
-    state_.log.warning(std::string("The results may lack their end: ") + error.what());
-  }
+  closeResultsOfEarlyEnd({RunStage::failed, std::string(message), text});
   if (launcher_) launcher_->haltProcesses();  // before the report, which takes time
   reportRun();
   return endEarly(message);
@@ -357,9 +364,7 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
 
 int RunDriver::endCancelled(std::string_view message) {
   showMessage(message, {}, MessageType::information);
-  if (const auto unwritten = closeResults({RunStage::cancelled, std::string(message), std::string(message)})) {
-    state_.log.line(fmt::format("Error: Unable to write to {}\n{}", unwritten->path, unwritten->reason));
-  }
+  closeResultsOfEarlyEnd({RunStage::cancelled, std::string(message), std::string(message)});
   if (launcher_) launcher_->haltProcesses();
   reportRun();
   return endEarly(message);

@@ -61,6 +61,7 @@ class RunDriver final {
   TaskOutcome runTask();
   /// Completes the results and the record of the run; returns what failed, if anything. `report`: what the task found.
   std::optional<Unwritten> closeResults(const Ending& ending, std::span<const std::string> report = {});
+  void closeResultsOfEarlyEnd(const Ending& ending);
   void completeRecord(const Ending& ending);
   /// Writes the HTML report, if the setup asks for it and there are results. Failures are warnings.
   void reportRun();

@@ -48,7 +48,11 @@ void RunReporter::evaluationReplayed(std::span<const double> set, const Evaluati
   state_.progress.progressReplayed(result.number, result.ok());
   const std::vector<double> values = ToModelScale(space_, set);
   count(values, result, {});
-  if (!result.shownSeries.empty()) recordSeries(values, result);
+  if (!result.shownSeries.empty()) {
+    recordSeries(values, result);
+  } else if (result.ok() && recorder_ != nullptr) {
+    recorder_->evaluationPassed(result.number, values);
+  }
 }
 
 void RunReporter::count(const std::vector<double>& parameterValues, const EvaluationResult& result,

@@ -155,8 +155,7 @@ void MpiJob::abort(int exitCode) {
 
 std::unique_ptr<Job> joinMpiJob() {
   const auto launched = launchedProcessCount();
-  const int launcherRankAtStart = launcherRank();
-  const bool isLaunched = launched || launcherRankAtStart >= 0;
+  const bool isLaunched = launched || launcherRank() >= 0;
   if (!isLaunched) return nullptr;  // variables that the user has set for a model's own MPI are kept
   if (launched && *launched <= 1) {
     hideJobFromModels();
@@ -175,12 +174,11 @@ std::unique_ptr<Job> joinMpiJob() {
   hideJobFromModels();
   if (code == MPI_SUCCESS && count > 1) return std::make_unique<MpiJob>(rank, count);
   if (code == MPI_SUCCESS) MPI_Finalize();
-  if (!launched && launcherRankAtStart == 0) return nullptr;  // of a job of one process, for all that is known
-  fatalError(
-      "Error: The processes of the job cannot reach each other by MPI",
-      fmt::format("A job launcher started {} processes, of which each finds itself alone{}. Start them with the "
-                  "mpirun of the MPI that Mirevo is linked with, or with srun --mpi=pmix.",
-                  launched ? std::to_string(*launched) : "several", code == MPI_SUCCESS ? "" : ": " + errorText(code)));
+  if (!launched) return nullptr;
+  fatalError("Error: The processes of the job cannot reach each other by MPI",
+             fmt::format("A job launcher started {} processes, of which each finds itself alone{}. Start them with the "
+                         "mpirun of the MPI that Mirevo is linked with, or with srun --mpi=pmix.",
+                         *launched, code == MPI_SUCCESS ? "" : ": " + errorText(code)));
 }
 
 }  // namespace mirevo

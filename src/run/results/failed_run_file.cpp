@@ -44,6 +44,7 @@ std::string FailedRunFile::headLine() const {
 }
 
 FailedRunFile::Earlier FailedRunFile::readEarlier(const std::set<int>& numbers) const {
+  readFileIfThere(paths_.forPeople);  // one that cannot be read ends the run before anything is written
   Earlier earlier;
   std::set<int> missing = numbers;
   for (FailureRow& row : readFailureTable(readFileIfThere(paths_.table).value_or(""))) {

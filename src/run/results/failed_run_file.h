@@ -35,8 +35,8 @@ class FailedRunFile final {
     std::size_t unknown = 0;       ///< those of which the table does not say why they failed; they are the last
   };
 
-  /// Reads the table of an interrupted run for the evaluations with those numbers. Throws FatalError where there is one
-  /// that cannot be read.
+  /// Reads the table of an interrupted run for the evaluations with those numbers. Throws FatalError where one of
+  /// the files cannot be read.
   Earlier readEarlier(const std::set<int>& numbers) const;
 
   /// Continues both files behind those failures. `parameterValues`: of each, by number, model scale. A file for people

@@ -8,7 +8,7 @@
 
 namespace mirevo {
 
-/// A failed evaluation in `<setup>_Failures.dat`, which programs read.
+/// A failed evaluation in `<setup>_Failures.dat` or, of another task, its like, which programs read.
 struct FailureRow {
   int number = 0;  ///< of the evaluation
   EvaluationFailure failure;

@@ -77,20 +77,14 @@ bool ResultFile::finish(std::span<const std::string> closingLines, std::string& 
   return finished;
 }
 
-/// False for a row that is to be given its aggregate and is no longer what was written.
-bool ResultFile::appendRow(std::string& text, std::string_view content, const Place& place) const {
+void ResultFile::appendRow(std::string& text, std::string_view content, const Place& place) const {
   const auto length = static_cast<std::size_t>(place.length) - 1;  // without the line end
   const std::string_view line = content.substr(static_cast<std::size_t>(place.offset), length);
   const auto aggregate = aggregates_.find(place.number);
-  if (aggregate == aggregates_.end()) {
-    text.append(line) += '\n';
-    return true;
-  }
-  auto row = readResultRow(line, columns_);
-  if (!row) return false;
-  row->aggregate = aggregate->second;
-  text.append(resultRowText(*row)) += '\n';
-  return true;
+  auto row = aggregate == aggregates_.end() ? std::nullopt : readResultRow(line, columns_);
+  if (row) row->aggregate = aggregate->second;
+  text += row ? resultRowText(*row) : line;
+  text += '\n';
 }
 
 bool ResultFile::rewriteInOrder(std::string_view closing, std::string& reason) const {
@@ -105,11 +99,7 @@ bool ResultFile::rewriteInOrder(std::string_view closing, std::string& reason) c
   std::string sorted;
   sorted.reserve(content->size() + closing.size());
   sorted.append(*content, 0, static_cast<std::size_t>(headLength_));
-  for (const Place& place : ordered) {
-    if (appendRow(sorted, *content, place)) continue;
-    reason = fmt::format("the row of evaluation {} was changed by another program", place.number);
-    return false;
-  }
+  for (const Place& place : ordered) appendRow(sorted, *content, place);
   sorted += closing;
   return replaceFile(path(), sorted, reason);
 }

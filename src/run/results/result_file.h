@@ -45,7 +45,7 @@ class ResultFile final {
     std::int64_t length;
   };
   bool isInOrder() const;
-  bool appendRow(std::string& text, std::string_view content, const Place& place) const;
+  void appendRow(std::string& text, std::string_view content, const Place& place) const;
   bool rewriteInOrder(std::string_view closing, std::string& reason) const;
 
   RecordFile file_;

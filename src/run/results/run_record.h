@@ -18,8 +18,8 @@ enum class RunStage { running, finished, cancelled, failed, cutOff };
 /// What files call it: "running", "finished", "cancelled", "failed" or "cut off".
 std::string_view runStageKey(RunStage stage);
 
-/// The account of a run for programs to read, `<setup>_Run.dat`: a table of keys and values. What is not known yet is
-/// left out.
+/// The account of a run for programs to read, such as `<setup>_Run.dat`: a table of keys and values. What is not known
+/// yet is left out.
 struct RunRecord {
   std::string task;     ///< its key
   std::string program;  ///< its version

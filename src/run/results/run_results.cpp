@@ -58,7 +58,12 @@ RunResults::RunResults(const RunConfig& config, const SearchSpace& space, const 
       failedRuns_({failedRunsPath(filePrefix), files_.failures}, config.setupName, space.names, tableHead_),
       record_(files_.record, tableHead_) {
   if (config.task && config.restart != RestartMode::startAfresh) {
-    earlierRun_ = findEarlierRun(files_, config, columns_, record_.readEarlier());
+    auto record = record_.readEarlier();
+    const bool isDamaged = !record && readFileIfThere(files_.record);
+    earlierRun_ = findEarlierRun(files_, config, columns_, std::move(record));
+    if (earlierRun_ && isDamaged) {
+      earlierRun_->notes.push_back(fmt::format("Restart: {} is damaged and written again", files_.record));
+    }
   }
 }
 

@@ -78,6 +78,10 @@ void SeriesRecorder::holdInitial(const EvaluationResult& result, std::span<const
   isChanged_ = true;
 }
 
+void SeriesRecorder::evaluationPassed(int number, std::span<const double> values) {
+  if (initialChoice_.consider(number, values)) initial_.reset();
+}
+
 void SeriesRecorder::holdUnsettled(const EvaluationResult& result, std::span<const double> values) {
   const std::size_t steps = stepCount(result.shownSeries);
   if (unsettledSteps_ + steps > kMostUnsettledSteps) return;

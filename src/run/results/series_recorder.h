@@ -43,6 +43,9 @@ class SeriesRecorder final {
   void evaluationFinished(const EvaluationResult& result, std::span<const double> values,
                           const std::optional<BestEvaluation>& best);
 
+  /// Takes a successful evaluation of an earlier run, of which there is no series unless resume() has taken it over.
+  void evaluationPassed(int number, std::span<const double> values);
+
   /// Takes the aggregate of an evaluation for which it was not known before.
   void aggregateSettled(int number, double aggregate);
 

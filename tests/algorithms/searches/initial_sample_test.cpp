@@ -64,7 +64,8 @@ TEST(InitialSample, DrawsWithinBoundsTheInitialSetFirst) {
       ASSERT_EQ(sample.size(), 9U);
       EXPECT_EQ(sample.front() == bounds.initial, isIncluded) << generation;
       for (const ParameterSet& set : sample) {
-        EXPECT_THAT(set, ElementsAre(AllOf(testing::Ge(-1), testing::Le(1)), 2, AllOf(testing::Ge(5), testing::Le(9))));
+        EXPECT_THAT(
+            set, ElementsAre(AllOf(::testing::Ge(-1), ::testing::Le(1)), 2, AllOf(::testing::Ge(5), ::testing::Le(9))));
       }
       UniformGenerator again(-7);
       EXPECT_EQ(drawInitialSample({isIncluded, SampleGeneration{generation}, ""}, {}, bounds, 9, again), sample)

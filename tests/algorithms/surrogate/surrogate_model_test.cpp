@@ -18,15 +18,15 @@
 namespace mirevo {
 namespace {
 
-using Function = double (*)(const std::vector<double>&);
+using Surface = double (*)(const std::vector<double>&);
 
-std::vector<double> valuesOf(const UnitPoints& points, Function function) {
+std::vector<double> valuesOf(const UnitPoints& points, Surface function) {
   std::vector<double> values;
   for (const auto& point : points) values.push_back(function(point));
   return values;
 }
 
-void expectPredictions(const SurrogateModel& model, Function function, UniformGenerator& random, std::size_t size,
+void expectPredictions(const SurrogateModel& model, Surface function, UniformGenerator& random, std::size_t size,
                        double tolerance) {
   for (const auto& point : latinHypercube(10, size, random))
     EXPECT_NEAR(model.predict(point), function(point), tolerance);

@@ -7,12 +7,12 @@
 namespace mirevo {
 namespace {
 
-const ResultColumns kColumns{{"X1"}, {"RMSE"}, {}};
-const std::string kHead = "# A title\n# Mirevo\nEvaluation\tStatus\tX1\tRMSE\tAggregate\n";
+const ResultColumns kTableColumns{{"X1"}, {"RMSE"}, {}};
+const std::string kTableHead = "# A title\n# Mirevo\nEvaluation\tStatus\tX1\tRMSE\tAggregate\n";
 
 TEST(ResultTable, RowsHaveTheirNumbersBetweenHeadAndClosingLines) {
   const std::string rows = "1\tOK\t0.1\t1\t2\n2\tFAILED\tNaN\t-Inf\t5e-324\n";
-  const ResultTable table = readResultTable(kHead + rows + "# Cancelled\n# Best evaluation: 1\n", kColumns);
+  const ResultTable table = readResultTable(kTableHead + rows + "# Cancelled\n# Best evaluation: 1\n", kTableColumns);
   ASSERT_EQ(table.rows.size(), 2U);
   EXPECT_EQ(resultRowText(table.rows[0]) + "\n" + resultRowText(table.rows[1]) + "\n", rows);
   EXPECT_EQ(table.headLines, (std::vector<std::string>{"A title", "Mirevo"}));
@@ -21,10 +21,10 @@ TEST(ResultTable, RowsHaveTheirNumbersBetweenHeadAndClosingLines) {
 
 TEST(ResultTable, AFileCutAtAnyByteHoldsItsWholeRowsAndNoOther) {
   const std::string rows = "1\tOK\t1.25\t3\t3\n2\tFAILED\t2.5\t1e+30\t1e+30\n";
-  const std::string text = kHead + rows;
+  const std::string text = kTableHead + rows;
   for (std::size_t length = 0; length <= text.size(); ++length) {
-    const ResultTable table = readResultTable(std::string_view(text).substr(0, length), kColumns);
-    const std::size_t firstEnd = kHead.size() + rows.find('\n') + 1;
+    const ResultTable table = readResultTable(std::string_view(text).substr(0, length), kTableColumns);
+    const std::size_t firstEnd = kTableHead.size() + rows.find('\n') + 1;
     ASSERT_EQ(table.rows.size(), length == text.size() ? 2u : (length >= firstEnd ? 1u : 0u)) << length;
     if (!table.rows.empty()) {
       EXPECT_EQ(resultRowText(table.rows[0]), "1\tOK\t1.25\t3\t3");
@@ -36,25 +36,25 @@ TEST(ResultTable, OtherColumnsAreToldFromNone) {
   const std::tuple<std::string, std::size_t, std::size_t> cases[] = {
       {"Evaluation\tStatus\tX2\tRMSE\tAggregate\n", 1, 0}, {"Evaluation\tStatus\tX1\tAggregate\n", 0, 1}};
   for (const auto& [header, rows, others] : cases) {
-    const ResultTable table = readResultTable(header + "1\tOK\t1\t2\t3\n2\tOK\t1\t2\n", kColumns);
+    const ResultTable table = readResultTable(header + "1\tOK\t1\t2\t3\n2\tOK\t1\t2\n", kTableColumns);
     EXPECT_TRUE(table.hasHeader);
     EXPECT_FALSE(table.hasExpectedColumns);
     EXPECT_EQ(table.rows.size(), rows);
     EXPECT_EQ(table.rowsOfOtherColumns, others);
     EXPECT_EQ(table.unusableLines, 1U);
   }
-  EXPECT_TRUE(readResultTable("Evaluation\tStatus\tX1 \t RMSE\tAggregate\n", kColumns).hasExpectedColumns);
+  EXPECT_TRUE(readResultTable("Evaluation\tStatus\tX1 \t RMSE\tAggregate\n", kTableColumns).hasExpectedColumns);
 }
 
 TEST(ResultTable, DamagedRowsAreCountedAndPassedOver) {
   for (const std::string row : {"x\tOK\t1\t2\t3", "0\tOK\t1\t2\t3", "1\tDONE\t1\t2\t3", "1\tOK\t1\t2",
                                 "1\tOK\t1\t2\t3\t4", "1\tOK\t1\t\t3", "1\tOK\t1\t2\t3x", "99999999999\tOK\t1\t2\t3"}) {
-    const ResultTable table = readResultTable(kHead + row + "\n2\tOK\t1\t2\t3\n", kColumns);
+    const ResultTable table = readResultTable(kTableHead + row + "\n2\tOK\t1\t2\t3\n", kTableColumns);
     EXPECT_EQ(table.unusableLines, 1u) << row;
     ASSERT_EQ(table.rows.size(), 1u) << row;
     EXPECT_EQ(table.rows[0].number, 2) << row;
   }
-  EXPECT_FALSE(readResultTable("some other\ttext\n", kColumns).hasHeader);
+  EXPECT_FALSE(readResultTable("some other\ttext\n", kTableColumns).hasHeader);
 }
 
 }  // namespace

@@ -124,6 +124,11 @@ TEST_F(SeriesRecorderTest, GoesOnFromAnEarlierFileAndWarnsOnceWhereItCannotWrite
   evaluate(run, 3, 3.0);
   run.finish(best_);
   EXPECT_EQ(numbers(), "1 3");
+  SeriesRecorder withoutFile = recorder();
+  withoutFile.evaluationPassed(1, std::vector<double>{-1.0});
+  evaluate(withoutFile, 4, 2.0);
+  withoutFile.finish(best_);
+  EXPECT_FALSE(table().initial) << "a later evaluation is not the initial one";
 
   std::filesystem::remove(folder_ / "s_Series.dat");
   std::filesystem::create_directories(folder_ / "s_Series.dat/in the way");
