@@ -27,7 +27,7 @@ class OptimisationTask final : public Task {
   TaskOutcome run(const TaskContext& context) override;
   TaskReport report() const override;
   std::optional<RaisedBudget> raisedBudget(const SearchHistory& history) const override;
-  void continueFrom(std::vector<EarlierSearch> searches) override { earlierSearches_ = std::move(searches); }
+  void continueFrom(const std::vector<EarlierSearch>& searches) override { earlierSearches_ = searches; }
   std::vector<EarlierSearch> earlierSearches() const override { return earlierSearches_; }
 
   std::unique_ptr<SearchMethod> method;  ///< nullptr until it is read

@@ -10,6 +10,6 @@ std::optional<RaisedBudget> Task::raisedBudget(const SearchHistory& /*history*/)
   return std::nullopt;
 }
 
-void Task::continueFrom(std::vector<EarlierSearch> /*searches*/) {}
+void Task::continueFrom(const std::vector<EarlierSearch>& /*searches*/) {}
 
 }  // namespace mirevo

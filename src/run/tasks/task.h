@@ -128,7 +128,7 @@ class Task {
   /// For a search, what becomes of an earlier one with a smaller budget; empty if the budget was not raised.
   virtual std::optional<RaisedBudget> raisedBudget(const SearchHistory& history) const;
   /// Tells a search which searches with smaller budgets, made by the earlier run, it continues.
-  virtual void continueFrom(std::vector<EarlierSearch> searches);
+  virtual void continueFrom(const std::vector<EarlierSearch>& searches);
   virtual std::vector<EarlierSearch> earlierSearches() const { return {}; }
 
   /// One setting for the initial sample and the uncertainty analysis.
