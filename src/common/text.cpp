@@ -175,6 +175,12 @@ std::string onOneLine(std::string_view text) {
   return line;
 }
 
+std::string withoutLineEnds(std::string_view text) {
+  std::string line(text);
+  std::replace(line.begin(), line.end(), '\n', ' ');
+  return line;
+}
+
 std::string columnName(std::string_view name) {
   std::string harmless = onOneLine(trim(name));
   for (char& c : harmless) {

@@ -58,6 +58,8 @@ std::vector<std::string_view> splitLines(std::string_view text);
 
 /// `text` with every control character, including line ends, replaced by a blank.
 std::string onOneLine(std::string_view text);
+/// With a blank in the place of each line end alone; other control characters stay.
+std::string withoutLineEnds(std::string_view text);
 
 /// A name as a column heading, without anything that a reader of tab-separated values could misread.
 std::string columnName(std::string_view name);

@@ -28,9 +28,7 @@ std::string withoutNumbers(std::string_view reason) {
 
 /// On one line.
 std::string reasonOf(const FailureRow& row) {
-  std::string reason(trim(row.failure.reason));
-  std::replace(reason.begin(), reason.end(), '\n', ' ');
-  return reason;
+  return withoutLineEnds(trim(row.failure.reason));
 }
 
 /// The evaluation's number and the last lines that its batch printed.

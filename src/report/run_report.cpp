@@ -42,6 +42,7 @@ class ReportBuilder final {
   ReportBuilder(const RunConfig& config, const std::string& filePrefix)
       : config_(config), filePrefix_(filePrefix), parameters_(config.parameters, config.constraints) {}
 
+  /// Nothing to build from without a task: false then, too.
   bool readResults(std::string& reason);
   ReportData build();
 
@@ -120,7 +121,6 @@ void ReportBuilder::addRun() {
                         : aggregationMethodName(config_.aggregationMethod);
   run.periodStart = formatDate(config_.period.start);
   run.periodEnd = formatDate(config_.period.end);
-  if (!config_.task) return;
   run.task = config_.task->facts().name.name;
   if (config_.drawsRandomNumbers()) run.seed = config_.task->randomSeed;
   const TaskReport task = config_.task->report();
@@ -204,7 +204,7 @@ void ReportBuilder::addSeries() {
     return;
   }
   data_.series = *std::move(source.content);
-  if (config_.task && !data_.series.task.empty() && data_.series.task != config_.task->facts().name.name) {
+  if (!data_.series.isOf(data_.run.task)) {
     note(
         fmt::format("Hydrographs are not shown: {} is of a run of another task ({}).", source.file, data_.series.task));
     data_.series = {};
@@ -234,7 +234,6 @@ void ReportBuilder::addSeries() {
 }
 
 void ReportBuilder::addAnalyses() {
-  if (!config_.task) return;
   const bool isFinished = sources_.stage == RunStage::finished;
   const TaskReport task = config_.task->report();
   if (task.hasBands && isFinished) data_.bands = reportedBands(config_, filePrefix_);

@@ -216,7 +216,7 @@ void RunDriver::openSeries() {
       state_.log.warning(fmt::format("The series of the earlier run are not taken up: {}: {}", path, reason));
     }
     const SeriesTable table = readSeriesTable(earlier.value_or(std::string{}));
-    if (table.task.empty() || table.task == task) {
+    if (table.isOf(task)) {
       series_->resume(table);
     } else {
       keepEarlierFile(path);  // of a run of another task in between

@@ -4,6 +4,15 @@
 
 namespace mirevo {
 
+std::optional<SettingRefusal> validateSimplex(const SimplexSettings& simplex, std::int32_t available,
+                                              std::string_view source, std::string_view keyword,
+                                              std::string_view refusal) {
+  if (simplex.pointCount <= available) return std::nullopt;
+  return SettingRefusal{
+      std::string(refusal), keyword,
+      fmt::format("expected at most the {} points of {}, found {}", available, source, simplex.pointCount)};
+}
+
 bool PopulationMethod::evaluatesSample(const InitialSampleSettings& /*sample*/) const {
   return true;
 }

@@ -1,5 +1,9 @@
 #pragma once
 
+#include <cstdint>
+#include <optional>
+#include <string_view>
+
 #include "algorithms/searches/search_method.h"
 
 namespace mirevo {
@@ -7,6 +11,11 @@ namespace mirevo {
 struct SimplexSettings {
   std::int32_t pointCount = 2;
 };
+
+/// Refuses a simplex of more points than the `available` ones of its `source` ("the population"), with that fixed text.
+std::optional<SettingRefusal> validateSimplex(const SimplexSettings& simplex, std::int32_t available,
+                                              std::string_view source, std::string_view keyword,
+                                              std::string_view refusal);
 
 /// What the searches with a population have in common.
 class PopulationMethod : public SearchMethod {

@@ -28,15 +28,6 @@ constexpr std::string_view kSimplexKeyword = "No_Points_Simplex";
 constexpr std::string_view kContractionKeyword = "Prob_Contraction";
 constexpr std::string_view kSimplexRefusal = "Error: No. of points in a simplex in PSE algorithm invalid";
 
-/// That a simplex has no more points than the population.
-std::optional<SettingRefusal> validatePseControl(const PseMethod& method) {
-  const std::int32_t points = method.settings.populationSize;
-  if (method.simplex.pointCount <= points) return std::nullopt;
-  return SettingRefusal{
-      std::string(kSimplexRefusal), kSimplexKeyword,
-      fmt::format("expected at most the {} points of the population, found {}", points, method.simplex.pointCount)};
-}
-
 std::optional<SettingRefusal> validateProbabilities(const PseSettings& settings) {
   if (settings.reflectionProbability + settings.contractionProbability <= 1.0) return std::nullopt;
   return SettingRefusal{"Error: Sum of probabilities for reflection and contraction in PSE algorithm larger than 1",
@@ -205,7 +196,10 @@ BoundSection PseMethod::section() {
                                                .refusal = kSimplexRefusal,
                                                .meaning = "Points in a simplex, at most those of the population. The "
                                                           "same setting as SCE's `No_Points_Subcomplex`."}),
-                           [](const PseMethod& m) { return validatePseControl(m); }),
+                           [](const PseMethod& m) {
+                             return validateSimplex(m.simplex, m.settings.populationSize, "the population",
+                                                    kSimplexKeyword, kSimplexRefusal);
+                           }),
         setting<PseMethod>([](auto& m) -> auto& { return m.settings.reflectionProbability; },
                            {.name = "Prob_Reflection",
                             .defaultValue = "0.7",

@@ -3,8 +3,6 @@
 #include <algorithm>
 #include <utility>
 
-#include <fmt/format.h>
-
 #include "algorithms/surrogate/proposal_selector.h"
 
 namespace mirevo {
@@ -13,15 +11,6 @@ namespace {
 constexpr std::string_view kPointsKeyword = "No_Points_Complex";
 constexpr std::string_view kSubcomplexKeyword = "No_Points_Subcomplex";
 constexpr std::string_view kSubcomplexRefusal = "Error: No. of points in a subcomplex in SCE algorithm invalid";
-
-/// That a subcomplex has no more points than its complex.
-std::optional<SettingRefusal> validateSceControl(const SceMethod& method) {
-  const std::int32_t points = method.settings.pointsPerComplex;
-  if (method.simplex.pointCount <= points) return std::nullopt;
-  return SettingRefusal{
-      std::string(kSubcomplexRefusal), kSubcomplexKeyword,
-      fmt::format("expected at most the {} points of a complex, found {}", points, method.simplex.pointCount)};
-}
 
 }  // namespace
 
@@ -180,7 +169,10 @@ BoundSection SceMethod::section() {
                                 .range = from(2),
                                 .refusal = kSubcomplexRefusal,
                                 .meaning = "Points in a subcomplex, q, at most those of a complex; n + 1 is usual."}),
-            [](const SceMethod& m) { return validateSceControl(m); }),
+            [](const SceMethod& m) {
+              return validateSimplex(m.simplex, m.settings.pointsPerComplex, "a complex", kSubcomplexKeyword,
+                                     kSubcomplexRefusal);
+            }),
         setting<SceMethod>([](auto& m) -> auto& { return m.settings.evolutionSteps; },
                            {.name = "No_Evaluation_Steps",
                             .range = from(1),

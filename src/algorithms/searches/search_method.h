@@ -63,10 +63,7 @@ class SearchMethod {
   /// Its section inside OPTIMISATION_ALGORITHM with its keywords, bound to this object's settings.
   virtual BoundSection section() = 0;
   /// Settings that are small for n variable parameters.
-  virtual std::vector<SearchAdvice> advice(std::size_t n) const {
-    static_cast<void>(n);
-    return {};
-  }
+  virtual std::vector<SearchAdvice> advice(std::size_t /*n*/) const { return {}; }
   /// The fixed text for a budget below 1, if the search has one of its own.
   virtual std::string_view budgetRefusal() const { return {}; }
   /// Whether it evaluates a sample from which the scale of the objective functions can be determined.

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <functional>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -90,19 +91,14 @@ class SetupSection final {
   template <class Item, class ReadItem>
   void readItems(std::string_view prefix, const SettingSection<Item>& section, std::vector<Item>& items,
                  ReadItem readItem) const {
-    const std::size_t count = readCount(prefix);
-    for (std::size_t i = 0; i < count; ++i) {
-      const SetupSection opened = openItem(prefix, i + 1);
-      items.emplace_back();
-      opened.read(section, items.back());
-      readItem(opened, items.back());
-    }
+    readEachItem(prefix, section, items, readItem, std::identity());
   }
-  /// The same for a list that must not be empty.
-  template <class Item, class ReadItem>
-  void readItems(std::string_view prefix, const SettingSection<Item>& section, std::vector<Item>& items,
-                 std::string_view emptyMessage, ReadItem readItem) const {
-    readItems(prefix, section, items, readItem);
+  /// The same for a list that must not be empty. Where the settings that `section` fills are more than the item,
+  /// `settingsOf(item)` makes them.
+  template <class Settings, class Item, class ReadItem, class SettingsOf = std::identity>
+  void readItems(std::string_view prefix, const SettingSection<Settings>& section, std::vector<Item>& items,
+                 std::string_view emptyMessage, ReadItem readItem, SettingsOf settingsOf = {}) const {
+    readEachItem(prefix, section, items, readItem, settingsOf);
     if (items.empty()) refuse(emptyMessage, kItemCountKeyword, "expected 1 or more, found 0");
   }
 
@@ -125,6 +121,17 @@ class SetupSection final {
   std::string written(std::string_view keyword) const;
 
  private:
+  template <class Settings, class Item, class ReadItem, class SettingsOf>
+  void readEachItem(std::string_view prefix, const SettingSection<Settings>& section, std::vector<Item>& items,
+                    ReadItem readItem, SettingsOf settingsOf) const {
+    const std::size_t count = readCount(prefix);
+    for (std::size_t i = 0; i < count; ++i) {
+      const SetupSection opened = openItem(prefix, i + 1);
+      auto&& settings = settingsOf(items.emplace_back());
+      opened.read(section, settings);
+      readItem(opened, items.back());
+    }
+  }
   void takeRow(const KeywordRow& row, void* settings) const;
   void takeValue(const KeywordRow& row, const SetupValue& value, bool isDefault, void* settings) const;
   SetupValue convert(const KeywordRow& row, const KdxKeyword& keyword) const;

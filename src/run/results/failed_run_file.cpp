@@ -1,6 +1,5 @@
 #include "run/results/failed_run_file.h"
 
-#include <algorithm>
 #include <filesystem>
 #include <system_error>
 #include <utility>
@@ -15,11 +14,6 @@ namespace mirevo {
 namespace {
 
 constexpr std::string_view kIndent = "   ";
-
-std::string onOneLine(std::string text) {
-  std::replace(text.begin(), text.end(), '\n', ' ');
-  return text;
-}
 
 /// Makes `content` the file's, to be continued.
 void continueWith(RecordFile& file, const std::string& path, const std::string& content) {
@@ -95,7 +89,7 @@ void FailedRunFile::close() {
 std::string FailedRunFile::record(std::span<const double> parameterValues, const FailureRow& row) const {
   const EvaluationFailure& failure = row.failure;
   std::string text = fmt::format("\nEvaluation No. {} ({})\n{}{}\n", row.number, failureKindName(failure.kind), kIndent,
-                                 onOneLine(failure.reason));
+                                 withoutLineEnds(failure.reason));
   for (std::size_t i = 0; i < names_.size(); ++i) {
     text += fmt::format("{}{} = {}\n", kIndent, names_[i], formatReal(parameterValues[i]));
   }

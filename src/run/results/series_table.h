@@ -39,6 +39,9 @@ struct SeriesTable {
                                        ///< succeeded
   std::optional<ShownEvaluation> best;
   std::vector<ShownSeries> series;
+
+  /// Whether it is of a run of that task, as far as the file says.
+  bool isOf(std::string_view otherTask) const { return task.empty() || task == otherTask; }
 };
 
 /// The names of the measures with these 0-based indices in the table, made unique.

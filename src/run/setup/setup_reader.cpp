@@ -184,16 +184,13 @@ void SetupReader::readObjectiveFunctions() {
                    measureSections.push_back(opened);
                  });
   NamesUsed names;
-  const SetupSection functions = section.open("OBJECTIVE_FUNCTIONS");
-  const std::size_t count = functions.readCount("OBJECTIVE_");
-  for (std::size_t i = 0; i < count; ++i) {
-    objectiveSections_.push_back(functions.openItem("OBJECTIVE_", i + 1));
-    ObjectiveSection filled{config_.objectives.emplace_back(), names};
-    objectiveSections_.back().read(objectiveSection(), filled);
-  }
-  if (count == 0) {
-    functions.refuse("Error: No objective functions defined", kItemCountKeyword, "expected 1 or more, found 0");
-  }
+  section.open("OBJECTIVE_FUNCTIONS")
+      .readItems(
+          "OBJECTIVE_", objectiveSection(), config_.objectives, "Error: No objective functions defined",
+          [this](const SetupSection& opened, const ObjectiveFunction&) { objectiveSections_.push_back(opened); },
+          [&names](ObjectiveFunction& function) {
+            return ObjectiveSection{function, names};
+          });
   connectMeasures(measureSections);
   if (!config_.task || !config_.task->mayHaveInitialSample()) requireScales(false);
 }
