@@ -114,6 +114,8 @@ void RunDriver::openRun(const std::string& setupFileName) {
 
   const std::string terminationLogProblem = openTerminationLog(runFilePath(filePrefix_, run_files::kTerminationLog));
   const std::string progressProblems = state_.progress.progressInit(logFile, environmentValue("VOLK_PROGRESS"));
+  state_.progress.progressStart(dateAndTimeWithZone(), hostName(), ::getpid());
+  state_.log.passWarningsTo([this](std::string_view text) { state_.progress.writeMessage(text); });
   for (const std::string_view problems :
        {std::string_view(terminationLogProblem), std::string_view(progressProblems)}) {
     for (const std::string_view problem : splitLines(problems)) {
@@ -121,7 +123,6 @@ void RunDriver::openRun(const std::string& setupFileName) {
       showMessage(problem, {}, MessageType::warning);
     }
   }
-  state_.progress.progressStart(dateAndTimeWithZone(), hostName(), ::getpid());
 }
 
 void RunDriver::buildModel() {
@@ -226,7 +227,11 @@ void RunDriver::openSeries() {
 }
 
 TaskOutcome RunDriver::runTask() {
-  if (!config_.task) return {std::string(kEndOfTask)};
+  if (!config_.task) {
+    showMessage(fmt::format("Nothing is run: Option in {} selects no task", config_.setupFile), {},
+                MessageType::warning);
+    return {std::string(kEndOfTask)};
+  }
   TaskOutcome outcome = config_.task->run({parameters_->searchSpace(), config_.parameters, config_.measures,
                                            config_.objectives, *evaluator_, state_.log,
                                            [this](const SearchSummary& summary) { reporter_->takeBestOf(summary); },
@@ -256,6 +261,8 @@ void RunDriver::completeRecord(const Ending& ending) {
   record.stage = ending.stage;
   record.message = ending.message;
   record.ended = ending.time;
+  record.warningCount = state_.log.warningCount();
+  record.warnings = state_.log.warnings();
   if (!reporter_) return;
   record.initialEvaluation = reporter_->initial();
   if (const auto& best = reporter_->best()) record.best = ShownEvaluation{best->number, best->aggregate};
@@ -312,6 +319,9 @@ void RunDriver::finish(const TaskOutcome& outcome) {
     state_.log.line(fmt::format("{} of them were taken from the earlier run", reporter_->replayedCount()));
   }
   logFailures();
+  if (state_.log.warningCount() > 0) {
+    state_.log.line(warningCountText() + ": the lines above that begin with \"Warning: \"");
+  }
   state_.log.line("");
   state_.log.line(kNormalTermination);
   if (!state_.log.writeError().empty()) {
@@ -324,6 +334,20 @@ void RunDriver::finish(const TaskOutcome& outcome) {
     showMessage(fmt::format("Warning: The end of {} may be missing: {}", state_.log.path(), state_.log.writeError()));
   }
   endProgress(kNormalTermination);
+  tellOfWarnings();
+}
+
+std::string RunDriver::warningCountText() const {
+  const int count = state_.log.warningCount();
+  return count == 1 ? std::string("1 warning") : fmt::format("{} warnings", count);
+}
+
+/// Says on standard error how many warnings there are and where.
+void RunDriver::tellOfWarnings() const {
+  if (state_.log.warningCount() == 0) return;
+  showMessage(fmt::format("{} in {}{}: {}", warningCountText(), state_.log.path(),
+                          state_.log.warningCount() == 1 ? "" : "; the first", state_.log.warnings().front()),
+              {}, MessageType::warning);
 }
 
 /// Writes the reasons of the failures to the log, and how often each occurred.
@@ -371,6 +395,7 @@ int RunDriver::endEarly(std::string_view ending) {
   if (launcher_) launcher_->haltProcesses();
   leaveJob(state_, 1, ending);
   endProgress(ending);
+  tellOfWarnings();
   return 1;
 }
 

@@ -71,6 +71,8 @@ class RunDriver final {
   /// Closes the log, halts the model processes, leaves the job and ends the progress.
   int endEarly(std::string_view ending);
   void endProgress(std::string_view ending);
+  std::string warningCountText() const;
+  void tellOfWarnings() const;
   std::vector<std::string> closingLines(const Ending& ending) const;
 
   RunState state_;

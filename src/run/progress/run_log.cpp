@@ -43,7 +43,10 @@ void RunLog::line(std::string_view text) {
 }
 
 void RunLog::warning(std::string_view text) {
-  line("Warning: " + std::string(text));
+  const std::string record = "Warning: " + std::string(text);
+  line(record);
+  if (++warningCount_ <= static_cast<int>(kMostWarningsKept)) warnings_.emplace_back(text);
+  if (listener_) listener_(record);
 }
 
 /// One write(2) per record, so that a signal handler never writes into the middle of one, and without buffering, so

@@ -1,7 +1,10 @@
 #pragma once
 
+#include <functional>
 #include <string>
 #include <string_view>
+#include <utility>
+#include <vector>
 
 namespace mirevo {
 
@@ -9,6 +12,8 @@ namespace mirevo {
 /// kill of the program.
 class RunLog final {
  public:
+  static constexpr std::size_t kMostWarningsKept = 20;
+
   RunLog() = default;
   ~RunLog();
   RunLog(const RunLog&) = delete;
@@ -21,7 +26,14 @@ class RunLog final {
 
   /// Writes one record; several lines if `text` has line ends.
   void line(std::string_view text);
+  /// Writes a record that begins with "Warning: ", and passes it on to whoever listens.
   void warning(std::string_view text);
+  /// From now on `listener` gets every warning as it is in the log.
+  void passWarningsTo(std::function<void(std::string_view)> listener) { listener_ = std::move(listener); }
+
+  /// The first warnings, without "Warning: ", at most kMostWarningsKept of them.
+  const std::vector<std::string>& warnings() const { return warnings_; }
+  int warningCount() const { return warningCount_; }
 
   /// For signal handlers; -1 while no file is open.
   int descriptor() const { return descriptor_; }
@@ -36,6 +48,9 @@ class RunLog final {
   int descriptor_ = -1;
   std::string path_;
   std::string pending_;  ///< lines written before the file was open
+  std::function<void(std::string_view)> listener_;
+  std::vector<std::string> warnings_;
+  int warningCount_ = 0;
   std::string writeError_;
 };
 
