@@ -104,7 +104,7 @@ void RunDriver::openRun(const std::string& setupFileName) {
                setup.file + ": both would work in the same folders. Wait for it, or run a copy under another name.");
   }
   const std::string logFile = runFilePath(filePrefix_, run_files::kLog);
-  const std::string keptLog = keepEarlierFile(logFile);
+  const std::string keptLog = RunLog::isOfRefusedSetup(logFile) ? std::string() : keepEarlierFile(logFile);
   std::string reason;
   if (!state_.log.open(logFile, reason)) fatalError("Error: Unable to open " + logFile, reason);
   signalState.runLogDescriptor = state_.log.descriptor();
@@ -112,7 +112,11 @@ void RunDriver::openRun(const std::string& setupFileName) {
   state_.log.line("Setup file: " + setup.file);
   if (!keptLog.empty()) state_.log.line("The log of the earlier run was kept as " + keptLog);
 
-  const std::string terminationLogProblem = openTerminationLog(runFilePath(filePrefix_, run_files::kTerminationLog));
+  // Where the name of the setup is mistyped, nothing more is made than a log and a message file.
+  const std::string terminationLog = runFilePath(filePrefix_, run_files::kTerminationLog);
+  const bool leavesEnding =
+      std::filesystem::exists(setup.file, ignored) || std::filesystem::exists(terminationLog, ignored);
+  const std::string terminationLogProblem = leavesEnding ? openTerminationLog(terminationLog) : std::string();
   const std::string progressProblems = state_.progress.progressInit(logFile, environmentValue("VOLK_PROGRESS"));
   state_.progress.progressStart(dateAndTimeWithZone(), hostName(), ::getpid());
   state_.log.passWarningsTo([this](std::string_view text) { state_.progress.writeMessage(text); });
@@ -163,6 +167,7 @@ void RunDriver::logSetup() {
 }
 
 void RunDriver::openResults() {
+  isAccepted_ = true;
   state_.objectiveValues.resize(config_.objectives.size());
   results_->open(config_, runner_->observedSeries(), *aggregator_, state_.log);
   putEarlierReportAside();
@@ -227,11 +232,7 @@ void RunDriver::openSeries() {
 }
 
 TaskOutcome RunDriver::runTask() {
-  if (!config_.task) {
-    showMessage(fmt::format("Nothing is run: Option in {} selects no task", config_.setupFile), {},
-                MessageType::warning);
-    return {std::string(kEndOfTask)};
-  }
+  if (!config_.task) return {std::string(kEndOfTask)};
   TaskOutcome outcome = config_.task->run({parameters_->searchSpace(), config_.parameters, config_.measures,
                                            config_.objectives, *evaluator_, state_.log,
                                            [this](const SearchSummary& summary) { reporter_->takeBestOf(summary); },
@@ -334,6 +335,9 @@ void RunDriver::finish(const TaskOutcome& outcome) {
     showMessage(fmt::format("Warning: The end of {} may be missing: {}", state_.log.path(), state_.log.writeError()));
   }
   endProgress(kNormalTermination);
+  if (count == 0) {
+    showMessage("Nothing was run: the setup selects no task or no search", {}, MessageType::warning);
+  }
   tellOfWarnings();
 }
 
@@ -364,6 +368,7 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
     if (reporter_ && reporter_->failedCount() > 0)
       text +=
           fmt::format("\nfailed model runs are described in {}", fileNameOf(results_->failedRuns().paths().forPeople));
+    if (!isAccepted_) state_.log.markRefused();
     state_.log.line("");
     if (reporter_) logFailures();
     state_.log.line(text);

@@ -77,8 +77,9 @@ class RunDriver final {
 
   RunState state_;
   RunLock lock_;
-  std::string filePrefix_;  ///< folder and name of the setup, without ".kdx": the beginning of the paths of the run's
-                            ///< files
+  bool isAccepted_ = false;  ///< the setup: from now on files of earlier runs are touched
+  std::string filePrefix_;   ///< folder and name of the setup, without ".kdx": the beginning of the paths of the run's
+                             ///< files
   RunConfig config_;
   std::unique_ptr<ParameterModel> parameters_;
   std::unique_ptr<ObjectiveAggregator> aggregator_;

@@ -75,12 +75,17 @@ TEST(Optimisation, OfEqualSetsTheResultsNameTheOneThatTheSearchTookAndUnusedPara
   EXPECT_THAT(log, HasSubstr("\n3 warnings: the lines above that begin with"));
 }
 
-TEST(Scenarios, AnOptionWithoutATaskSaysThatNothingIsRun) {
+TEST(Scenarios, ASetupThatSelectsNothingSaysSo) {
   const ModelFolder folder;
-  const ProgramResult run = runProgram({folder.writeSetup({.option = 5})});
-  EXPECT_EQ(run.exitCode, 0);
-  EXPECT_THAT(run.error, StartsWith("Mirevo: Nothing is run: Option in " + (folder / "basin.kdx")));
-  EXPECT_THAT(folder.read("basin.log"), EndsWith("\n\nNormal termination\n"));
+  for (const auto& [from, to] :
+       {std::pair{"Option = 2", "Option = 5"}, {"Use_Surrogate_Model = 0", "Use_Surrogate_Model = 2"}}) {
+    const std::string setup = folder.writeSetup({});
+    folder.editSetup(from, to);
+    const ProgramResult run = runProgram({setup});
+    EXPECT_EQ(run.exitCode, 0);
+    EXPECT_THAT(run.error, StartsWith("Mirevo: Nothing was run: the setup selects no task or no search\n"));
+    EXPECT_THAT(folder.read("basin.log"), EndsWith("\n\nNormal termination\n"));
+  }
 }
 
 TEST(Optimisation, ResultsAreTheSameBitsWhateverOrderTheModelRunsEndIn) {

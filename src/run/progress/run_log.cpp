@@ -1,10 +1,16 @@
 #include "run/progress/run_log.h"
 
+#include <algorithm>
 #include <cerrno>
 #include <cstring>
 #include <fcntl.h>
+#include <filesystem>
+#include <fstream>
+#include <iterator>
 #include <unistd.h>
 #include <utility>
+
+#include <fmt/core.h>
 
 #include "common/descriptor_output.h"
 #include "common/file_copy.h"
@@ -47,6 +53,15 @@ void RunLog::warning(std::string_view text) {
   line(record);
   if (++warningCount_ <= static_cast<int>(kMostWarningsKept)) warnings_.emplace_back(text);
   if (listener_) listener_(record);
+}
+
+bool RunLog::isOfRefusedSetup(const std::string& path) {
+  constexpr std::streamoff kMostRead = 65536;  // the mark is a few lines from the end
+  std::ifstream file(path, std::ios::binary | std::ios::ate);
+  if (!file) return false;
+  file.seekg(-std::min<std::streamoff>(kMostRead, file.tellg()), std::ios::end);
+  const std::string end(std::istreambuf_iterator<char>(file), {});
+  return end.find(fmt::format("\n{}\n\n", kRefused)) != std::string::npos;
 }
 
 /// One write(2) per record, so that a signal handler never writes into the middle of one, and without buffering, so

@@ -35,6 +35,11 @@ class RunLog final {
   const std::vector<std::string>& warnings() const { return warnings_; }
   int warningCount() const { return warningCount_; }
 
+  /// Writes that no model was run, for isOfRefusedSetup().
+  void markRefused() { line(kRefused); }
+  /// Whether the file is the log of a run whose setup was refused.
+  static bool isOfRefusedSetup(const std::string& path);
+
   /// For signal handlers; -1 while no file is open.
   int descriptor() const { return descriptor_; }
   const std::string& path() const { return path_; }
@@ -43,6 +48,9 @@ class RunLog final {
   const std::string& writeError() const { return writeError_; }
 
  private:
+  static constexpr std::string_view kRefused =
+      "The setup is refused: no model was run, and the next start replaces this log";
+
   void write(std::string_view record);
 
   int descriptor_ = -1;
