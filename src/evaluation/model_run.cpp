@@ -342,10 +342,10 @@ std::optional<EvaluationFailure> ModelRunner::readSeriesMeasure(int slot, std::s
   }
   try {
     // A model that stopped early is a failed evaluation; a setup whose period no model run can match ends the run.
-    if (series_.hadPairs(i) && !hasPairs(measure, description_.period, simulation, series_.observation(i))) {
+    if (series_.needsPairs(i) && !hasPairs(measure, description_.period, simulation, series_.observation(i))) {
       return makeFailure(Kind::resultsNotWritten,
                          fmt::format("{}: item No. {} ({}) has no value at any observation time in the evaluation "
-                                     "period, as it had before the run",
+                                     "period",
                                      path, measure.simulation.itemNo, simulation.itemName(measure.simulation.itemNo)),
                          slot);
     }
