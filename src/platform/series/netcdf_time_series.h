@@ -17,8 +17,8 @@ class NetcdfTimeSeries final : public StoredTimeSeries {
   ~NetcdfTimeSeries() override;
 
   bool open(const std::string& fileName) override;
-  /// NaN: every variable may have markers of its own (`_FillValue`, `missing_value`, the library's default fill value),
-  /// all of which are replaced by NaN.
+  /// NaN: every variable may have markers of its own (`_FillValue`, `missing_value`, the library's default fill value)
+  /// and limits (`valid_min`, `valid_max`, `valid_range`); what they mark is replaced by NaN.
   std::optional<float> deleteValue() const override;
 
  private:
