@@ -80,6 +80,23 @@ TEST(LocalSensitivity, OfALinearModelGivesTheCovarianceOfItsClosedForm) {
   EXPECT_THAT(folder.read("basin.log"), HasSubstr("\nParameter covariance: 365 observations, 2 parameters, 363 "));
 }
 
+TEST(Scenarios, OfALogarithmicParameterRunWithTheValuesGiven) {
+  const ModelFolder folder;
+  const std::string setup = folder.writeSetup({.option = 0, .scenarios = {"5, 1, 1", "10, 1, 1"}});
+  folder.editSetup("Lower_Bound = 0.0", "Lower_Bound = 0.1");
+  folder.editSetup("Transformation_Type = 0", "Transformation_Type = 1");
+  folder.editSetup("[INTERNAL_CONSTRAINTS]\n      TqSEKdxListItemCount = 0",
+                   "[INTERNAL_CONSTRAINTS]\n      TqSEKdxListItemCount = 1\n      [CONSTRAINT_1]\n"
+                   "        Left_Equation = 'a'\n        Right_Equation = '10'\n        Logical_Operator = 1\n"
+                   "      [/CONSTRAINT_1]");
+  const ProgramResult run = runProgram({setup});
+  ASSERT_EQ(run.exitCode, 0) << run.error;
+  const auto rows = readDataTable(folder.read("basin.dat")).rows;
+  ASSERT_EQ(rows.size(), 2U);
+  EXPECT_EQ(rows[0][2], "5");
+  EXPECT_EQ(rows[1][2], "10");
+}
+
 TEST(Uncertainty, SummaryAndBandAreThoseOfTheSample) {
   const ModelFolder folder;
   std::string observed = folder.read("observed.csv");

@@ -171,7 +171,7 @@ std::vector<ParameterLimits> parameterLimits(const ParameterCovariance& covarian
     const double reach = covariance.tQuantile * deviation;
     // The limits of an integer parameter are not rounded to integers: they are those of a continuous quantity.
     if (space.transformation[j] == TransformationType::logarithmic) {
-      const double value = std::exp(set[j]);
+      const double value = toModelScale(space, j, set[j]);
       limits.push_back({value, value * deviation, std::exp(set[j] - reach), std::exp(set[j] + reach)});
     } else {
       limits.push_back({set[j], deviation, set[j] - reach, set[j] + reach});

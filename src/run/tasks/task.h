@@ -101,6 +101,8 @@ class Task {
   virtual std::vector<const SectionRow*> sections() const = 0;
   /// Reads and checks its sections. Throws FatalError.
   virtual void read(const TaskReading& reading) = 0;
+  /// The values that its sections give for a parameter, by its 0-based position; runs get them exactly.
+  virtual std::vector<double> givenValues(std::size_t parameter) const;
   /// Whether it may have an initial sample; if so, read() calls requireScales().
   virtual bool mayHaveInitialSample() const { return false; }
 
