@@ -5,10 +5,13 @@
 #include <cmath>
 #include <limits>
 #include <numeric>
+#include <utility>
 
 #include <fmt/core.h>
 
 #include "common/run_files.h"
+#include "common/text.h"
+#include "parameters/value_format.h"
 
 namespace mirevo {
 
@@ -86,6 +89,43 @@ ParameterDifference planDifference(const Step& step, bool central, std::size_t j
   difference.width = sets[difference.plus][j] - sets[difference.minus][j];
   if (!(difference.width > 0.0)) difference.problem = "the perturbation is too small to change its value";
   return difference;
+}
+
+/// The search-scale value of what the model reads for a value of parameter j; empty if the field holds no number.
+std::optional<double> searchValueAsWritten(const SearchSpace& space, std::size_t j, double value, int fieldWidth) {
+  const double modelValue = toModelScale(space, j, value);
+  const std::optional<double> written = valueAsWritten(modelValue, fieldWidth);
+  if (!written || *written == modelValue) return written ? std::optional(value) : std::nullopt;
+  if (space.transformation[j] != TransformationType::logarithmic) return written;
+  return *written > 0.0 ? std::optional(std::log(*written)) : std::nullopt;
+}
+
+/// Takes the width of a difference as the model gets it from a field of this many characters.
+void takeWidthAsWritten(const SearchSpace& space, std::size_t j, int fieldWidth, std::span<const ParameterSet> sets,
+                        ParameterDifference& difference) {
+  constexpr double kWorthAWarning = 0.01;
+  constexpr double kExact = 1.0e-9;  // a field that holds 15 digits: what it cuts is no more than a rounding error
+  const double minusValue = sets[difference.minus][j];
+  const double plusValue = sets[difference.plus][j];
+  const std::optional<double> minus = searchValueAsWritten(space, j, minusValue, fieldWidth);
+  const std::optional<double> plus = searchValueAsWritten(space, j, plusValue, fieldWidth);
+  const double wanted = difference.width;
+  difference.width = minus && plus ? *plus - *minus : 0.0;
+  if (std::abs(difference.width - wanted) <= kExact * wanted) {
+    difference.width = wanted;
+    return;
+  }
+  const std::string fields =
+      fmt::format("in its field of {} characters {} is written as \"{}\" and {} as \"{}\"", fieldWidth,
+                  formatReal(toModelScale(space, j, minusValue)),
+                  trim(FormatValueForPlaceholder(toModelScale(space, j, minusValue), fieldWidth)),
+                  formatReal(toModelScale(space, j, plusValue)),
+                  trim(FormatValueForPlaceholder(toModelScale(space, j, plusValue), fieldWidth)));
+  if (difference.width == 0.0) {
+    difference.problem = fields;
+  } else if (std::abs(difference.width - wanted) > kWorthAWarning * wanted) {
+    difference.warning = fields + "; the difference is that of the values as written";
+  }
 }
 
 SensitivityTable tabulate(const PerturbationPlan& plan, std::span<const EvaluationResult> results,
@@ -177,14 +217,25 @@ const SettingSection<SensitivitySettings>& localSensitivitySection() {
 }
 
 PerturbationPlan planPerturbations(const SensitivitySettings& settings, const SearchSpace& space,
-                                   std::span<const double> base) {
+                                   std::span<const double> base, std::span<const int> fieldWidths) {
   PerturbationPlan plan;
   plan.sets.emplace_back(base.begin(), base.end());
   for (std::size_t j = 0; j < space.size(); ++j) {
     const Step step = wantedStep(settings, space, base, j);
     plan.differences.push_back(planDifference(step, settings.differencing == Differencing::central, j, plan.sets));
+    const int fieldWidth = j < fieldWidths.size() ? fieldWidths[j] : 0;
+    if (fieldWidth == 0 || !plan.differences.back().problem.empty()) continue;
+    takeWidthAsWritten(space, j, fieldWidth, plan.sets, plan.differences.back());
   }
   return plan;
+}
+
+std::vector<int> ofVariableParameters(std::span<const int> fieldWidths, std::span<const ModelParameter> parameters) {
+  std::vector<int> widths;
+  for (std::size_t i = 0; i < fieldWidths.size(); ++i) {
+    if (parameters[i].parameterType == ParameterType::variable) widths.push_back(fieldWidths[i]);
+  }
+  return widths;
 }
 
 bool hasRoomForStep(const SensitivitySettings& settings, const SearchSpace& space, std::size_t j) {
@@ -193,9 +244,10 @@ bool hasRoomForStep(const SensitivitySettings& settings, const SearchSpace& spac
   return step.up <= step.roomUp * kRounding || step.down <= step.roomDown * kRounding;
 }
 
-LocalSensitivity localSensitivity(const SensitivitySettings& settings, const SearchSpace& space, Evaluator& evaluator) {
+LocalSensitivity localSensitivity(const SensitivitySettings& settings, const SearchSpace& space, Evaluator& evaluator,
+                                  std::span<const int> fieldWidths) {
   LocalSensitivity sensitivity;
-  sensitivity.plan = planPerturbations(settings, space, space.initial);
+  sensitivity.plan = planPerturbations(settings, space, space.initial, fieldWidths);
   sensitivity.results = evaluator.evaluateParameterSets(sensitivity.plan.sets, DispatchMode::task);
   noteFailures(sensitivity.plan, sensitivity.results);
   sensitivity.measures = tabulate(sensitivity.plan, sensitivity.results, &EvaluationResult::measureValues);
@@ -259,8 +311,12 @@ std::vector<std::string> formatSensitivity(const LocalSensitivity& sensitivity, 
   std::vector<std::string> lines{"Local sensitivity analysis"};
   for (std::size_t j = 0; j < names.parameters.size(); ++j) {
     const std::string& problem = sensitivity.plan.differences[j].problem;
-    if (problem.empty()) continue;
-    lines.push_back(fmt::format("Warning: Parameter {} has no derivatives: {}", names.parameters[j], problem));
+    const std::string& warning = sensitivity.plan.differences[j].warning;
+    if (!problem.empty()) {
+      lines.push_back(fmt::format("Warning: Parameter {} has no derivatives: {}", names.parameters[j], problem));
+    } else if (!warning.empty()) {
+      lines.push_back(fmt::format("Warning: Parameter {}: {}", names.parameters[j], warning));
+    }
   }
   const auto appendBoth = [&](const std::string& what, const SensitivityTable& table,
                               std::span<const std::string> outputs) {

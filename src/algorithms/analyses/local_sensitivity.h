@@ -32,9 +32,10 @@ const SettingSection<SensitivitySettings>& localSensitivitySection();
 struct ParameterDifference {
   std::size_t minus = 0;  ///< 0-based among the sets; 0 is the base set
   std::size_t plus = 0;
-  double width = 0.0;   ///< value of the parameter in `plus` minus that in `minus`, search scale; 0: not perturbed
+  double width = 0.0;   ///< value of the parameter in `plus` minus that in `minus`, as written; search scale; 0: none
   double extent = 0.0;  ///< what scales the derivatives: the range or the value, search scale
   std::string problem;  ///< why there are no derivatives; empty when there are some
+  std::string warning;  ///< what makes them less certain; may be empty
 };
 
 /// All parameter sets of an analysis, the base set first, and which differences of their results to take.
@@ -46,9 +47,13 @@ struct PerturbationPlan {
 /// Perturbs each parameter of `base` by the fraction of its range on the search scale, or of its value on the model
 /// scale (a logarithmic parameter x becomes x (1 + fraction)); an integer parameter moves by whole steps, at least one.
 /// Where a step would leave the bounds the difference is one-sided, inwards; where neither side has room the step is
-/// shortened.
+/// shortened. The width of a difference is that of the values that a model reads from a field of `fieldWidths`
+/// characters, one entry per parameter of the space (0 or no entry: any value as it is).
 PerturbationPlan planPerturbations(const SensitivitySettings& settings, const SearchSpace& space,
-                                   std::span<const double> base);
+                                   std::span<const double> base, std::span<const int> fieldWidths = {});
+
+/// The entries of the variable parameters, of one per model parameter.
+std::vector<int> ofVariableParameters(std::span<const int> fieldWidths, std::span<const ModelParameter> parameters);
 
 /// Whether parameter j has room for its whole step from the initial value of the space in at least one direction.
 bool hasRoomForStep(const SensitivitySettings& settings, const SearchSpace& space, std::size_t j);
@@ -75,7 +80,8 @@ struct LocalSensitivity {
 
 /// Evaluates all perturbed sets in one batch, the base set (the space's initial values) first. A failed run leaves its
 /// parameter's derivatives out, with the reason in the plan.
-LocalSensitivity localSensitivity(const SensitivitySettings& settings, const SearchSpace& space, Evaluator& evaluator);
+LocalSensitivity localSensitivity(const SensitivitySettings& settings, const SearchSpace& space, Evaluator& evaluator,
+                                  std::span<const int> fieldWidths = {});
 
 /// The derivatives of any outputs by differences: p columns, one row per value; NaN for a parameter with a problem.
 /// `outputs[i]` are the values of set i; those of a failed set may be empty.

@@ -151,7 +151,8 @@ int SensitivityTask::plannedEvaluations(std::size_t variableCount) const {
 
 TaskOutcome SensitivityTask::run(const TaskContext& context) {
   TaskOutcome outcome{std::string(kEndOfTask)};
-  const LocalSensitivity sensitivity = localSensitivity(settings, context.space, context.evaluator);
+  const std::vector<int> fieldWidths = ofVariableParameters(context.fieldWidths, context.parameters);
+  const LocalSensitivity sensitivity = localSensitivity(settings, context.space, context.evaluator, fieldWidths);
   const AnalysisNames names = analysisNames(context);
   outcome.report = formatSensitivity(sensitivity, names);
   outcome.tables = sensitivityTables(sensitivity, names);

@@ -56,6 +56,8 @@ struct TaskContext {
   std::string filePrefix = {};  ///< folder and name of the setup: the beginning of the paths of the run's files
   /// The observations whose simulated values the results hold; needed if the task keepsSimulatedValues().
   std::span<const ObservedSeries> observedSeries = {};
+  /// By model parameter, the width of the widest placeholder into which it is written; 0: none.
+  std::vector<int> fieldWidths = {};
 };
 
 /// A file beside the results.

@@ -9,6 +9,7 @@
 
 #include "algorithms/function_evaluator.h"
 #include "matchers.h"
+#include "parameters/value_format.h"
 
 namespace mirevo {
 namespace {
@@ -81,6 +82,31 @@ TEST(PlanPerturbations, NamesAStepThatRoundsAway) {
   const SearchSpace space = spaceOf({{kNone, 1e18, 1e18 - 1e4, 1e18 + 1e4}});
   const PerturbationPlan plan = planPerturbations({kForward, kOfRange, 1e-6}, space, space.initial);
   EXPECT_EQ(plan.differences[0].problem, "the perturbation is too small to change its value");
+}
+
+/// A model that returns what it reads from fields of nine characters has the derivative 1.
+TEST(LocalSensitivity, DividesByTheStepAsWritten) {
+  constexpr int kWidths[] = {9, 9};
+  FunctionEvaluator evaluator([](const ParameterSet& p) {
+    EvaluationResult result;
+    result.measureValues = {*valueAsWritten(p[0], 9) + std::log(*valueAsWritten(std::exp(p[1]), 9))};
+    return result;
+  });
+  const SearchSpace space = spaceOf({{kNone, 0.30103, 0, 1}, {kLog, std::log(0.0271828), -9, 0}});
+  const AnalysisNames names{space.names, {"y"}, {}};
+  for (const Differencing differencing : {kForward, kCentral}) {
+    for (const double fraction : {0.1, 0.0371, 0.0031}) {
+      const LocalSensitivity found = localSensitivity({differencing, kOfValue, fraction}, space, evaluator, kWidths);
+      EXPECT_NEAR(found.measures.derivatives[0][0], 1.0, 1e-9) << fraction;
+      EXPECT_NEAR(found.measures.derivatives[1][0], 1.0, 1e-9) << fraction;
+    }
+  }
+  // 0.30103 (1 + 0.0031) is 0.301963193, which the field cuts after its fourth digit.
+  EXPECT_THAT(formatSensitivity(localSensitivity({kForward, kOfValue, 0.0031}, space, evaluator, kWidths), names),
+              Contains("Warning: Parameter p1: in its field of 9 characters 0.30103 is written as \"3.010E-01\" and "
+                       "0.301963193 as \"3.019E-01\"; the difference is that of the values as written"));
+  EXPECT_EQ(planPerturbations({kForward, kOfValue, 1e-4}, space, space.initial, kWidths).differences[0].problem,
+            "in its field of 9 characters 0.30103 is written as \"3.010E-01\" and 0.301060103 as \"3.010E-01\"");
 }
 
 /// Measures x² + 3y and e^z; objective functions 2y and z.
