@@ -340,35 +340,43 @@ std::optional<float> NetcdfTimeSeries::deleteValue() const {
   return std::numeric_limits<float>::quiet_NaN();
 }
 
-bool NetcdfTimeSeries::readItem(std::size_t place) {
-  Item& item = items_[place];
+std::optional<std::vector<double>> NetcdfTimeSeries::readValues(std::size_t place) {
   const Place& at = places_[place];
-  const std::string where = "variable \"" + item.name + "\"";
+  const std::string where = "variable \"" + items_[place].name + "\"";
   nc_type type = NC_NAT;
-  if (!succeeded(nc_inq_vartype(file_, at.variable, &type), "reading " + where)) return false;
+  if (!succeeded(nc_inq_vartype(file_, at.variable, &type), "reading " + where)) return std::nullopt;
   std::vector<std::size_t> start(static_cast<std::size_t>(at.dimensionCount), 0);
   std::vector<std::size_t> count(start.size(), 1);
   count[static_cast<std::size_t>(at.timePosition)] = times_.size();
   if (at.stationPosition >= 0) start[static_cast<std::size_t>(at.stationPosition)] = at.station;
-  std::vector<double> stored(times_.size());
-  if (!succeeded(nc_get_vara_double(file_, at.variable, start.data(), count.data(), stored.data()),
+  std::vector<double> values(times_.size());
+  if (!succeeded(nc_get_vara_double(file_, at.variable, start.data(), count.data(), values.data()),
                  "reading " + where)) {
-    return false;
+    return std::nullopt;
   }
   Unpacking unpack(file_, at.variable, type);
   unpack.applyValidRange(file_, at.variable);
-  std::vector<float> values;
-  values.reserve(stored.size());
-  for (std::size_t step = 0; step < stored.size(); ++step) {
-    const double value = unpack(stored[step]);
-    values.push_back(static_cast<float>(value));
-    if (std::isinf(values.back())) {
-      return fail(fmt::format("{}, step {}: expected a number of at most 3.4028235e38 in size, found {}", where,
-                              step + 1, formatReal(value)));
+  for (std::size_t step = 0; step < values.size(); ++step) {
+    values[step] = unpack(values[step]);
+    if (std::isinf(static_cast<float>(values[step]))) {
+      fail(fmt::format("{}, step {}: expected a number of at most 3.4028235e38 in size, found {}", where, step + 1,
+                       formatReal(values[step])));
+      return std::nullopt;
     }
   }
-  item.values = std::move(values);
+  return values;
+}
+
+bool NetcdfTimeSeries::readItem(std::size_t place) {
+  const std::optional<std::vector<double>> values = readValues(place);
+  if (!values) return false;
+  items_[place].values.reserve(values->size());
+  for (const double value : *values) items_[place].values.push_back(static_cast<float>(value));
   return true;
+}
+
+std::vector<double> NetcdfTimeSeries::readExactItem(std::size_t place) {
+  return readValues(place).value_or(std::vector<double>(times_.size(), kNaN));
 }
 
 }  // namespace mirevo

@@ -23,6 +23,9 @@ class NetcdfTimeSeries final : public StoredTimeSeries {
 
  private:
   bool readItem(std::size_t place) override;
+  std::vector<double> readExactItem(std::size_t place) override;
+  /// The values of an item, unpacked; nothing, with the last error, when that fails.
+  std::optional<std::vector<double>> readValues(std::size_t place);
   const std::string& sourceName() const override { return fileName_; }
   /// Where the values of an item are in the file.
   struct Place {

@@ -121,6 +121,7 @@ class Task {
   virtual bool drawsRandomNumbers() const { return false; }
   /// Whether it uses the simulated values at the observation times, which the results then must hold.
   virtual bool keepsSimulatedValues() const { return false; }
+  virtual SeriesPrecision keptPrecision() const { return SeriesPrecision::single; }
   /// Empty if its batches fill several slots.
   virtual std::optional<OneSlotOnly> needsOneSlot() const { return std::nullopt; }
 
