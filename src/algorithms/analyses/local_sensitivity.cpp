@@ -50,8 +50,10 @@ Step wantedStep(const SensitivitySettings& settings, const SearchSpace& space, s
   }
   if (type == TransformationType::integer && step.extent > 0.0) {
     step.up = step.down = std::max(1.0, std::round(step.up));
-    step.roomUp = std::floor(step.roomUp);
-    step.roomDown = std::floor(step.roomDown);
+    // 3.3 - 1.3 is 1.9999999999999998, but two steps.
+    constexpr double kRounding = 1.0e-8;
+    step.roomUp = std::floor(step.roomUp + kRounding);
+    step.roomDown = std::floor(step.roomDown + kRounding);
   }
   return step;
 }
@@ -66,7 +68,7 @@ ParameterDifference planDifference(const Step& step, bool central, std::size_t j
   const double x = sets.front()[j];
   ParameterDifference difference;
   difference.extent = step.extent;
-  if (step.up == 0.0) {
+  if (step.up == 0.0 || step.roomUp + step.roomDown == 0.0) {
     difference.problem = step.roomUp + step.roomDown == 0.0
                              ? "its bounds are equal"
                              : "its value is 0, and the perturbation is a fraction of it";
@@ -79,14 +81,17 @@ ParameterDifference planDifference(const Step& step, bool central, std::size_t j
     difference.plus = addSet(x + step.up);
   } else if (fitsUp || (!fitsDown && step.roomUp >= step.roomDown && step.roomUp > 0.0)) {
     difference.plus = addSet(x + std::min(step.up, step.roomUp));
-  } else if (step.roomDown > 0.0) {
-    difference.minus = addSet(x - std::min(step.down, step.roomDown));
   } else {
-    difference.problem = "its bounds are equal";
-    return difference;
+    difference.minus = addSet(x - std::min(step.down, step.roomDown));
+  }
+  if (central && !difference.isCentral()) {
+    difference.warnings.push_back(fmt::format("its {} bound leaves no room for the step: the difference is one-sided",
+                                              difference.minus == 0 ? "lower" : "upper"));
   }
   // The width after rounding, which is that of the sets that are run.
   difference.width = sets[difference.plus][j] - sets[difference.minus][j];
+  difference.widthBelow = x - sets[difference.minus][j];
+  difference.widthAbove = sets[difference.plus][j] - x;
   if (!(difference.width > 0.0)) difference.problem = "the perturbation is too small to change its value";
   return difference;
 }
@@ -115,6 +120,11 @@ void takeWidthAsWritten(const SearchSpace& space, std::size_t j, int fieldWidth,
     difference.width = wanted;
     return;
   }
+  if (difference.isCentral()) {
+    const double base = searchValueAsWritten(space, j, sets.front()[j], fieldWidth).value_or(kNaN);
+    difference.widthBelow = minus ? base - *minus : kNaN;
+    difference.widthAbove = plus ? *plus - base : kNaN;
+  }
   const std::string fields =
       fmt::format("in its field of {} characters {} is written as \"{}\" and {} as \"{}\"", fieldWidth,
                   formatReal(toModelScale(space, j, minusValue)),
@@ -124,7 +134,7 @@ void takeWidthAsWritten(const SearchSpace& space, std::size_t j, int fieldWidth,
   if (difference.width == 0.0) {
     difference.problem = fields;
   } else if (std::abs(difference.width - wanted) > kWorthAWarning * wanted) {
-    difference.warning = fields + "; the difference is that of the values as written";
+    difference.warnings.push_back(fields + "; the difference is that of the values as written");
   }
 }
 
@@ -158,11 +168,27 @@ SensitivityTable tabulate(const PerturbationPlan& plan, std::span<const Evaluati
 
 void noteFailures(PerturbationPlan& plan, std::span<const EvaluationResult> results) {
   for (ParameterDifference& difference : plan.differences) {
-    for (const std::size_t set : {difference.minus, difference.plus}) {
-      if (!difference.problem.empty() || results[set].ok()) continue;
-      difference.problem = fmt::format("evaluation {} failed: {}", results[set].number, results[set].failure->reason);
+    const bool hasBelow = results[difference.minus].ok();
+    const bool hasAbove = results[difference.plus].ok();
+    if (!difference.problem.empty() || (hasBelow && hasAbove)) continue;
+    const EvaluationResult& failed = results[hasBelow ? difference.plus : difference.minus];
+    const std::string reason = fmt::format("evaluation {} failed: {}", failed.number, failed.failure->reason);
+    const double width = hasBelow ? difference.widthBelow : difference.widthAbove;
+    if (!difference.isCentral() || hasBelow == hasAbove || !results.front().ok() || !(std::abs(width) > 0.0)) {
+      difference.problem = reason;
+      continue;
     }
+    (hasBelow ? difference.plus : difference.minus) = 0;
+    difference.width = width;
+    difference.warnings.push_back(reason + ": the difference is one-sided");
   }
+}
+
+/// The difference quotient of an output, by the base value where one side of a central difference has none.
+double quotient(const ParameterDifference& difference, double below, double base, double above) {
+  const double central = (above - below) / difference.width;
+  if (!difference.isCentral() || !std::isnan(central)) return central;
+  return std::isnan(below) ? (above - base) / difference.widthAbove : (base - below) / difference.widthBelow;
 }
 
 std::vector<std::size_t> rank(std::span<const double> composite) {
@@ -241,6 +267,8 @@ std::vector<int> ofVariableParameters(std::span<const int> fieldWidths, std::spa
 bool hasRoomForStep(const SensitivitySettings& settings, const SearchSpace& space, std::size_t j) {
   constexpr double kRounding = 1.0 + 1.0e-12;
   const Step step = wantedStep(settings, space, space.initial, j);
+  // Equal bounds leave no parameter to perturb; it is left out by name.
+  if (step.roomUp + step.roomDown == 0.0) return true;
   return step.up <= step.roomUp * kRounding || step.down <= step.roomDown * kRounding;
 }
 
@@ -267,8 +295,11 @@ std::vector<std::vector<double>> differenceColumns(const PerturbationPlan& plan,
     const std::vector<double>& minus = outputs[difference.minus];
     const std::vector<double>& plus = outputs[difference.plus];
     std::vector<double> column(count, kNaN);
+    const std::vector<double>& base = outputs.front();
     if (difference.problem.empty() && minus.size() == count && plus.size() == count) {
-      for (std::size_t i = 0; i < count; ++i) column[i] = (plus[i] - minus[i]) / difference.width;
+      for (std::size_t i = 0; i < count; ++i) {
+        column[i] = quotient(difference, minus[i], base.size() == count ? base[i] : kNaN, plus[i]);
+      }
     }
     columns.push_back(std::move(column));
   }
@@ -311,10 +342,11 @@ std::vector<std::string> formatSensitivity(const LocalSensitivity& sensitivity, 
   std::vector<std::string> lines{"Local sensitivity analysis"};
   for (std::size_t j = 0; j < names.parameters.size(); ++j) {
     const std::string& problem = sensitivity.plan.differences[j].problem;
-    const std::string& warning = sensitivity.plan.differences[j].warning;
     if (!problem.empty()) {
       lines.push_back(fmt::format("Warning: Parameter {} has no derivatives: {}", names.parameters[j], problem));
-    } else if (!warning.empty()) {
+      continue;
+    }
+    for (const std::string& warning : sensitivity.plan.differences[j].warnings) {
       lines.push_back(fmt::format("Warning: Parameter {}: {}", names.parameters[j], warning));
     }
   }

@@ -35,7 +35,12 @@ struct ParameterDifference {
   double width = 0.0;   ///< value of the parameter in `plus` minus that in `minus`, as written; search scale; 0: none
   double extent = 0.0;  ///< what scales the derivatives: the range or the value, search scale
   std::string problem;  ///< why there are no derivatives; empty when there are some
-  std::string warning;  ///< what makes them less certain; may be empty
+  /// The two parts of the width of a central difference, below and above the base value.
+  double widthBelow = 0.0;
+  double widthAbove = 0.0;
+  std::vector<std::string> warnings;  ///< what makes them less certain
+
+  bool isCentral() const { return minus != 0 && plus != 0; }
 };
 
 /// All parameter sets of an analysis, the base set first, and which differences of their results to take.
@@ -78,13 +83,15 @@ struct LocalSensitivity {
   std::vector<std::size_t> ranking;
 };
 
-/// Evaluates all perturbed sets in one batch, the base set (the space's initial values) first. A failed run leaves its
-/// parameter's derivatives out, with the reason in the plan.
+/// Evaluates all perturbed sets in one batch, the base set (the space's initial values) first. Where one of the two
+/// runs of a central difference failed, the other and the base set give a one-sided one; else a failed run leaves its
+/// parameter's derivatives out. The plan says so.
 LocalSensitivity localSensitivity(const SensitivitySettings& settings, const SearchSpace& space, Evaluator& evaluator,
                                   std::span<const int> fieldWidths = {});
 
 /// The derivatives of any outputs by differences: p columns, one row per value; NaN for a parameter with a problem.
-/// `outputs[i]` are the values of set i; those of a failed set may be empty.
+/// `outputs[i]` are the values of set i; those of a failed set may be empty. A value that one side of a central
+/// difference lacks is replaced by that of the base set.
 std::vector<std::vector<double>> differenceColumns(const PerturbationPlan& plan,
                                                    std::span<const std::vector<double>> outputs);
 

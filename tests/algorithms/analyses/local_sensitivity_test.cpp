@@ -62,6 +62,7 @@ TEST(PlanPerturbations, TakesItsStepsInsideTheBounds) {
       {"integer, at least one", {kInteger, 5, 0, 11}, {kCentral, kOfRange, 0.01}, 4, 6},
       {"integer, rounded", {kInteger, 5, 0, 11}, {kCentral, kOfRange, 0.26}, 2, 8},
       {"integer at its largest value", {kInteger, 10, 0, 11}, {kForward, kOfRange, 0.01}, 9, 10},
+      {"integer, two steps to the bound", {kInteger, 1.3, 0.3, 4.3}, {kForward, kOfRange, 0.6}, 1.3, 3.3},
       {"integer of one value", {kInteger, 4, 4, 5}, {kForward, kOfRange, 0.01}, 4, 4},
   };
   for (const auto& [what, parameter, settings, minus, plus] : cases) {
@@ -72,6 +73,10 @@ TEST(PlanPerturbations, TakesItsStepsInsideTheBounds) {
     EXPECT_DOUBLE_EQ(plan.sets[difference.minus][1], minus) << what;
     EXPECT_DOUBLE_EQ(plan.sets[difference.plus][1], plus) << what;
     EXPECT_EQ(difference.problem.empty(), minus < plus) << what;
+    EXPECT_EQ(!difference.warnings.empty(), settings.differencing == kCentral && minus < plus &&
+                                                (minus == parameter.initial || plus == parameter.initial))
+        << what;
+    EXPECT_TRUE(parameter.lower < parameter.upper || hasRoomForStep(settings, space, 1)) << what;
     EXPECT_DOUBLE_EQ(difference.width, plus - minus) << what;
     EXPECT_EQ(plan.sets[difference.minus][0], 7.0) << what;
     EXPECT_EQ(plan.sets[difference.plus][0], 7.0) << what;
@@ -159,6 +164,22 @@ TEST(LocalSensitivity, LeavesAFailedRunsColumnOutByName) {
   EXPECT_THAT(formatSensitivity(result, names), Contains("     3. p2                          NaN"));
 }
 
+TEST(LocalSensitivity, UsesTheOtherSideWhereOneFailed) {
+  FunctionEvaluator evaluator([](const ParameterSet& p) {
+    EvaluationResult result = evaluate(p);
+    if (p[0] > 2.0)
+      result.failure = EvaluationFailure{EvaluationFailure::Kind::timedOut, "the batch ran out of time", {}};
+    return result;
+  });
+  const SearchSpace space = spaceOf({{kNone, 2, 0, 4}, {kNone, 1, 0, 10}, {kLog, 1, 0, 2}});
+  const LocalSensitivity result = localSensitivity({kCentral, kOfRange, 0.1}, space, evaluator);
+  EXPECT_NEAR(result.measures.derivatives[0][0], 3.6, 1e-13);
+  EXPECT_NEAR(result.measures.derivatives[1][0], 3.0, 1e-13);
+  EXPECT_THAT(
+      formatSensitivity(result, {space.names, {"bias", "peak"}, {"low", "high"}}),
+      Contains("Warning: Parameter p1: evaluation 3 failed: the batch ran out of time: the difference is one-sided"));
+}
+
 TEST(LocalSensitivity, OfAFailedBaseSetHasCentralDerivativesOnly) {
   FunctionEvaluator evaluator([](const ParameterSet& p) {
     EvaluationResult result = evaluate(p);
@@ -183,6 +204,10 @@ TEST(Linearise, LeavesTheColumnOfAFailedSetUnknown) {
   EXPECT_THAT(model->residuals, ElementsAre(0.5, -0.5));
   EXPECT_THAT(model->jacobian[0], ElementsAre(0.5, 2.0));
   EXPECT_TRUE(std::isnan(model->jacobian[1][0]) && std::isnan(model->jacobian[1][1]));
+  // A value that one run of a central difference lacks.
+  const PerturbationPlan central = planPerturbations({kCentral, kOfRange, 0.25}, spaceOf({{kNone, 2, 0, 4}}), {{2.0}});
+  EXPECT_THAT(differenceColumns(central, std::vector<std::vector<double>>{{5, 5}, {3, 2}, {6, NAN}})[0],
+              ElementsAre(1.5, 3.0));
 }
 
 }  // namespace
