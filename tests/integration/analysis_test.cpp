@@ -178,6 +178,20 @@ TEST(LocalSensitivity, ReproducesCertifiedStandardDeviations) {
   }
 }
 
+TEST(LocalSensitivity, LeavesOutTheSecondOfTwoParametersThatActAsASumAtAnyStep) {
+  for (const char* format : {"%.6f", "%.7g", "%.17g"}) {
+    CertifiedProblem problem{nullptr, {}, {{"3.1", 0}, {"2.7", 0}}};
+    const std::string formula = fmt::format("sprintf(\"{}\", (b[1] + b[2]) * exp(-x / 7)) + 0", format);
+    problem.formula = formula.c_str();
+    for (int i = 0; i < 40; ++i) problem.data.emplace_back(i, 5.8 * std::exp(-i / 7.0) + (i % 3 - 1) * 0.1);
+    for (const char* fraction : {"1e-2", "1e-3", "1e-4"}) {
+      const std::vector<double> deviations = deviationsOf(problem, fraction);
+      EXPECT_GT(deviations[0], 0.0) << format << " " << fraction;
+      EXPECT_TRUE(std::isnan(deviations[1])) << format << " " << fraction << " " << deviations[1];
+    }
+  }
+}
+
 TEST(Scenarios, OfALogarithmicParameterRunWithTheValuesGiven) {
   const ModelFolder folder;
   const std::string setup = folder.writeSetup({.option = 0, .scenarios = {"5, 1, 1", "10, 1, 1"}});

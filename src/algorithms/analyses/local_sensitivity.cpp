@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cassert>
+#include <charconv>
 #include <cmath>
 #include <limits>
 #include <numeric>
@@ -306,6 +307,40 @@ std::vector<std::vector<double>> differenceColumns(const PerturbationPlan& plan,
   return columns;
 }
 
+std::vector<double> printedUnits(std::span<const double> values, std::span<const std::vector<double>> others) {
+  constexpr int kSingleDigits = 9;
+  int mostDigits = 0;
+  int lowestPlace = std::numeric_limits<int>::max();
+  bool isSingle = true;
+  const auto take = [&](double value) {
+    if (!std::isfinite(value) || value == 0.0) return;
+    char text[32];
+    const std::string_view shortest(
+        text, std::to_chars(std::begin(text), std::end(text), std::abs(value), std::chars_format::scientific).ptr);
+    const std::size_t mark = shortest.find('e');
+    const int digits = static_cast<int>(mark) - (mark > 1 ? 1 : 0);
+    const int exponent = static_cast<int>(std::floor(std::log10(std::abs(value))));
+    mostDigits = std::max(mostDigits, digits);
+    lowestPlace = std::min(lowestPlace, exponent - digits + 1);
+    isSingle = isSingle && static_cast<double>(static_cast<float>(value)) == value;
+  };
+  std::for_each(values.begin(), values.end(), take);
+  for (const std::vector<double>& more : others) std::for_each(more.begin(), more.end(), take);
+  std::vector<double> units;
+  for (const double value : values) {
+    const double size = std::abs(value);
+    if (mostDigits == 0 || !std::isfinite(value)) {
+      units.push_back(0.0);
+    } else if (isSingle && mostDigits > kSingleDigits) {
+      units.push_back(size * static_cast<double>(std::numeric_limits<float>::epsilon()));
+    } else {
+      const double ofDigits = size > 0.0 ? std::pow(10.0, std::floor(std::log10(size)) - mostDigits + 1) : 0.0;
+      units.push_back(std::max(std::pow(10.0, lowestPlace), ofDigits));
+    }
+  }
+  return units;
+}
+
 std::optional<LinearisedModel> linearise(const PerturbationPlan& plan,
                                          std::span<const std::vector<double>> simulatedValues,
                                          std::span<const double> observedValues, std::vector<double> weights) {
@@ -315,6 +350,7 @@ std::optional<LinearisedModel> linearise(const PerturbationPlan& plan,
   for (std::size_t i = 0; i < base.size(); ++i) model.residuals.push_back(base[i] - observedValues[i]);
   model.weights = std::move(weights);
   model.jacobian = differenceColumns(plan, simulatedValues);
+  for (const ParameterDifference& difference : plan.differences) model.widths.push_back(difference.width);
   return model;
 }
 
@@ -356,6 +392,14 @@ std::vector<std::string> formatSensitivity(const LocalSensitivity& sensitivity, 
     appendTable(lines, "Derivatives of " + what, outputs, names.parameters, table.derivatives);
     appendTable(lines, "Scaled sensitivities of " + what, outputs, names.parameters, table.scaled);
   };
+  for (const EvaluationResult& result : sensitivity.results) {
+    const EvaluationResult& base = sensitivity.results.front();
+    if (!base.ok() || !result.ok() || !(result.aggregate < base.aggregate)) continue;
+    lines.push_back(
+        fmt::format("Warning: evaluation {} fits better than the base set: its aggregate is {}, not {}; the "
+                    "base set is not the best, and its derivatives and deviations mislead",
+                    result.number, formatReal(result.aggregate), formatReal(base.aggregate)));
+  }
   appendBoth("output measures", sensitivity.measures, names.measures);
   appendBoth("objective functions", sensitivity.objectives, names.objectives);
 

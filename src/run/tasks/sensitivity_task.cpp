@@ -55,6 +55,8 @@ struct ComparedValues {
   std::vector<double> observed;  ///< NaN for an observation that does not count
   std::vector<ObservationLabel> labels;
   std::vector<double> weights;
+  std::vector<std::size_t> series;
+  std::vector<double> units;                   ///< in which the simulated values are printed
   std::vector<std::vector<double>> simulated;  ///< empty for a set that failed
 };
 
@@ -77,11 +79,17 @@ ComparedValues compareSeries(const TaskContext& context, std::span<const Evaluat
                                         [&](std::size_t other) { return isSamePair(measure, measures[other]); });
     if (!counts || isRepeated) continue;
     taken.push_back(series.measure);
+    std::vector<std::vector<double>> runs;
     for (std::size_t i = 0; i < results.size(); ++i) {
       if (!results[i].ok()) continue;
       const auto from = results[i].simulatedValues.begin() + static_cast<std::ptrdiff_t>(begin);
-      compared.simulated[i].insert(compared.simulated[i].end(), from,
-                                   from + static_cast<std::ptrdiff_t>(series.values.size()));
+      runs.emplace_back(from, from + static_cast<std::ptrdiff_t>(series.values.size()));
+      compared.simulated[i].insert(compared.simulated[i].end(), runs.back().begin(), runs.back().end());
+    }
+    compared.series.insert(compared.series.end(), series.values.size(), series.measure);
+    if (!runs.empty()) {
+      const std::vector<double> units = printedUnits(runs.front(), runs);
+      compared.units.insert(compared.units.end(), units.begin(), units.end());
     }
     const std::int64_t origin = secondNumber(series.start);
     for (std::size_t t = 0; t < series.values.size(); ++t) {
@@ -107,12 +115,14 @@ void addCovariance(const TaskContext& context, const LocalSensitivity& sensitivi
     outcome.report.emplace_back("Warning: No covariance matrix: no objective function compares time series");
     return;
   }
-  const std::optional<LinearisedModel> model =
+  std::optional<LinearisedModel> model =
       linearise(sensitivity.plan, compared.simulated, compared.observed, std::move(compared.weights));
   if (!model) {
     outcome.report.emplace_back("Warning: No covariance matrix: the model run with the initial values failed");
     return;
   }
+  model->series = std::move(compared.series);
+  model->units = std::move(compared.units);
   const ParameterCovariance covariance = parameterCovariance(*model);
   const ParameterSet& set = sensitivity.plan.sets.front();
   for (std::string& line : formatCovariance(covariance, context.space, set)) outcome.report.push_back(std::move(line));
