@@ -168,6 +168,25 @@ std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, 
   return reported;
 }
 
+void takeObservationComposites(const std::string& filePrefix, ReportedSensitivity& sensitivity) {
+  std::string fault;
+  const ReadTable table = readTable(runFilePath(filePrefix, run_files::kSensitivities), fault);
+  const auto kind = table.column("Kind");
+  const auto composite = table.column("Composite");
+  if (!kind || !composite) return;
+  std::vector<double> found;
+  for (const std::vector<std::string>& cells : table.rows) {
+    if (cells[*kind] != "observations" || found.size() == sensitivity.parameters.size()) continue;
+    if (cells.front() != sensitivity.parameters[found.size()]) return;
+    found.push_back(realCell(cells[*composite]).value_or(std::numeric_limits<double>::quiet_NaN()));
+  }
+  if (found.empty() || found.size() != sensitivity.parameters.size()) return;
+  sensitivity.composite = std::move(found);
+  sensitivity.isOfObservations = true;
+  sensitivity.ranking.clear();
+  for (const std::size_t i : ranked(sensitivity.composite)) sensitivity.ranking.push_back(sensitivity.parameters[i]);
+}
+
 std::optional<ReportedCovariance> reportedCovariance(const std::string& filePrefix, std::string& fault) {
   const std::string limitsFile = runFilePath(filePrefix, run_files::kParameterLimits);
   const std::string correlationFile = runFilePath(filePrefix, run_files::kCorrelation);

@@ -192,17 +192,6 @@ double quotient(const ParameterDifference& difference, double below, double base
   return std::isnan(below) ? (above - base) / difference.widthAbove : (base - below) / difference.widthBelow;
 }
 
-std::vector<std::size_t> rank(std::span<const double> composite) {
-  std::vector<std::size_t> order(composite.size());
-  std::iota(order.begin(), order.end(), std::size_t{0});
-  std::stable_sort(order.begin(), order.end(), [&](std::size_t a, std::size_t b) {
-    if (std::isnan(composite[a]) || std::isnan(composite[b]))
-      return !std::isnan(composite[a]) && std::isnan(composite[b]);
-    return composite[a] > composite[b];
-  });
-  return order;
-}
-
 void appendTable(std::vector<std::string>& lines, const std::string& title, std::span<const std::string> outputs,
                  std::span<const std::string> parameters, std::span<const std::vector<double>> rows) {
   lines.emplace_back();
@@ -282,7 +271,7 @@ LocalSensitivity localSensitivity(const SensitivitySettings& settings, const Sea
   sensitivity.measures = tabulate(sensitivity.plan, sensitivity.results, &EvaluationResult::measureValues);
   sensitivity.objectives = tabulate(sensitivity.plan, sensitivity.results, &EvaluationResult::objectiveValues);
   const bool hasObjectives = !sensitivity.objectives.base.empty();
-  sensitivity.ranking = rank(hasObjectives ? sensitivity.objectives.composite : sensitivity.measures.composite);
+  sensitivity.ranking = ranked(hasObjectives ? sensitivity.objectives.composite : sensitivity.measures.composite);
   return sensitivity;
 }
 
@@ -341,6 +330,33 @@ std::vector<double> printedUnits(std::span<const double> values, std::span<const
   return units;
 }
 
+std::vector<std::size_t> ranked(std::span<const double> values) {
+  std::vector<std::size_t> order(values.size());
+  std::iota(order.begin(), order.end(), std::size_t{0});
+  std::stable_sort(order.begin(), order.end(), [&](std::size_t a, std::size_t b) {
+    if (std::isnan(values[a]) || std::isnan(values[b])) return !std::isnan(values[a]) && std::isnan(values[b]);
+    return values[a] > values[b];
+  });
+  return order;
+}
+
+void takeObservations(const LinearisedModel& model, LocalSensitivity& sensitivity) {
+  sensitivity.ofObservations.clear();
+  for (std::size_t j = 0; j < model.jacobian.size(); ++j) {
+    const double extent = sensitivity.plan.differences[j].extent;
+    double squares = 0.0;
+    std::size_t count = 0;
+    for (std::size_t i = 0; i < model.residuals.size(); ++i) {
+      const double change = model.jacobian[j][i] * extent;
+      if (!std::isfinite(model.residuals[i]) || !std::isfinite(change)) continue;
+      squares += (model.weights.empty() ? 1.0 : model.weights[i]) * change * change;
+      ++count;
+    }
+    sensitivity.ofObservations.push_back(count == 0 ? kNaN : std::sqrt(squares / static_cast<double>(count)));
+  }
+  sensitivity.ranking = ranked(sensitivity.ofObservations);
+}
+
 std::optional<LinearisedModel> linearise(const PerturbationPlan& plan,
                                          std::span<const std::vector<double>> simulatedValues,
                                          std::span<const double> observedValues, std::vector<double> weights) {
@@ -359,7 +375,8 @@ std::vector<DataTable> sensitivityTables(const LocalSensitivity& sensitivity, co
   table.file = run_files::kSensitivities;
   table.headLines = {
       "Derivatives on the search scale, and dimensionless: times the extent of the parameter, over the "
-      "size of the output; the composite is their root mean square over all outputs of a kind"};
+      "size of the output; the composite is their root mean square over all outputs of a kind, or, of the "
+      "derivatives times the extent, over all weighted observations"};
   table.columns = {"Parameter", "Kind", "Output", "Derivative", "Scaled", "Composite", "Problem"};
   for (std::size_t j = 0; j < names.parameters.size(); ++j) {
     const auto add = [&](const std::string& kind, const SensitivityTable& found, std::span<const std::string> outputs) {
@@ -370,6 +387,9 @@ std::vector<DataTable> sensitivityTables(const LocalSensitivity& sensitivity, co
     };
     add("measure", sensitivity.measures, names.measures);
     add("objective", sensitivity.objectives, names.objectives);
+    if (sensitivity.ofObservations.empty()) continue;
+    table.rows.push_back({names.parameters[j], std::string("observations"), std::string("all"), kNaN, kNaN,
+                          sensitivity.ofObservations[j], sensitivity.plan.differences[j].problem});
   }
   return {std::move(table)};
 }
@@ -404,16 +424,19 @@ std::vector<std::string> formatSensitivity(const LocalSensitivity& sensitivity, 
   appendBoth("objective functions", sensitivity.objectives, names.objectives);
 
   const bool hasObjectives = !names.objectives.empty();
-  const std::vector<double>& composite =
-      hasObjectives ? sensitivity.objectives.composite : sensitivity.measures.composite;
-  std::vector<std::string> ranked;
+  const bool hasObservations = !sensitivity.ofObservations.empty();
+  const std::vector<double>& composite = hasObservations ? sensitivity.ofObservations
+                                         : hasObjectives ? sensitivity.objectives.composite
+                                                         : sensitivity.measures.composite;
+  std::vector<std::string> labels;
   std::vector<std::vector<double>> rows;
   for (const std::size_t j : sensitivity.ranking) {
-    ranked.push_back(fmt::format("{:>3}. {}", ranked.size() + 1, names.parameters[j]));
+    labels.push_back(fmt::format("{:>3}. {}", labels.size() + 1, names.parameters[j]));
     rows.push_back({composite[j]});
   }
-  const std::string headings[] = {"Composite scaled sensitivity"};
-  appendTable(lines, "Ranking", headings, ranked, rows);
+  const std::string headings[] = {hasObservations ? "Composite scaled sensitivity of the observations"
+                                                  : "Composite scaled sensitivity"};
+  appendTable(lines, "Ranking", headings, labels, rows);
   return lines;
 }
 

@@ -78,10 +78,16 @@ struct LocalSensitivity {
   std::vector<EvaluationResult> results;
   SensitivityTable measures;
   SensitivityTable objectives;
-  /// 0-based parameters, the most sensitive first, by the composite of the objective functions (of the output measures
-  /// where there is no objective function); ties in setup order, parameters without a composite last.
+  /// The composite scaled sensitivities over the observations, one per parameter; empty unless takeObservations() was
+  /// called.
+  std::vector<double> ofObservations;
+  /// 0-based parameters, the most sensitive first, by the composite of the observations; without that, of the objective
+  /// functions, or of the output measures where there is no objective function.
   std::vector<std::size_t> ranking;
 };
+
+/// Indices of the values, the largest first; ties in their order, NaN last.
+std::vector<std::size_t> ranked(std::span<const double> values);
 
 /// Evaluates all perturbed sets in one batch, the base set (the space's initial values) first. Where one of the two
 /// runs of a central difference failed, the other and the base set give a one-sided one; else a failed run leaves its
@@ -104,6 +110,11 @@ std::vector<double> printedUnits(std::span<const double> values, std::span<const
 std::optional<LinearisedModel> linearise(const PerturbationPlan& plan,
                                          std::span<const std::vector<double>> simulatedValues,
                                          std::span<const double> observedValues, std::vector<double> weights);
+
+/// Computes the composite scaled sensitivities over the observations and ranks by them: the root mean square of the
+/// derivatives of all simulated values times the extent of the parameter and the root of the weight (Hill and
+/// Tiedeman). Unlike the derivatives of a measure of the error, they do not vanish at an optimum.
+void takeObservations(const LinearisedModel& model, LocalSensitivity& sensitivity);
 
 /// The analysis as tables for programs: one row per parameter and output with the derivative, the scaled sensitivity,
 /// the composite of the parameter over all outputs of that kind, and the reason where there is none.

@@ -103,31 +103,43 @@ ComparedValues compareSeries(const TaskContext& context, std::span<const Evaluat
   return compared;
 }
 
+/// The model linearised at the base set, with the labels of its rows; or why there is none.
+struct Linearised {
+  std::optional<LinearisedModel> model;
+  std::vector<ObservationLabel> labels;
+  std::string problem;
+};
+
+Linearised linearised(const TaskContext& context, const LocalSensitivity& sensitivity) {
+  Linearised result;
+  if (sensitivity.results.front().ok()) {
+    ComparedValues compared = compareSeries(context, sensitivity.results);
+    if (compared.observed.empty()) {
+      result.problem = "no objective function compares time series";
+      return result;
+    }
+    result.model = linearise(sensitivity.plan, compared.simulated, compared.observed, std::move(compared.weights));
+    if (result.model) {
+      result.model->series = std::move(compared.series);
+      result.model->units = std::move(compared.units);
+    }
+    result.labels = std::move(compared.labels);
+  }
+  if (!result.model) result.problem = "the model run with the initial values failed";
+  return result;
+}
+
 /// Adds the covariance analysis to the outcome.
-void addCovariance(const TaskContext& context, const LocalSensitivity& sensitivity, TaskOutcome& outcome) {
+void addCovariance(const TaskContext& context, const ParameterSet& set, const Linearised& found, TaskOutcome& outcome) {
   outcome.report.emplace_back();
-  if (!sensitivity.results.front().ok()) {
-    outcome.report.emplace_back("Warning: No covariance matrix: the model run with the initial values failed");
+  if (!found.model) {
+    outcome.report.push_back("Warning: No covariance matrix: " + found.problem);
     return;
   }
-  ComparedValues compared = compareSeries(context, sensitivity.results);
-  if (compared.observed.empty()) {
-    outcome.report.emplace_back("Warning: No covariance matrix: no objective function compares time series");
-    return;
-  }
-  std::optional<LinearisedModel> model =
-      linearise(sensitivity.plan, compared.simulated, compared.observed, std::move(compared.weights));
-  if (!model) {
-    outcome.report.emplace_back("Warning: No covariance matrix: the model run with the initial values failed");
-    return;
-  }
-  model->series = std::move(compared.series);
-  model->units = std::move(compared.units);
-  const ParameterCovariance covariance = parameterCovariance(*model);
-  const ParameterSet& set = sensitivity.plan.sets.front();
+  const ParameterCovariance covariance = parameterCovariance(*found.model);
   for (std::string& line : formatCovariance(covariance, context.space, set)) outcome.report.push_back(std::move(line));
   for (DataTable& table : covarianceTables(covariance, context.space, set)) outcome.tables.push_back(std::move(table));
-  outcome.tables.push_back(jacobianTable(*model, context.space, compared.labels));
+  outcome.tables.push_back(jacobianTable(*found.model, context.space, found.labels));
 }
 
 }  // namespace
@@ -162,11 +174,14 @@ int SensitivityTask::plannedEvaluations(std::size_t variableCount) const {
 TaskOutcome SensitivityTask::run(const TaskContext& context) {
   TaskOutcome outcome{std::string(kEndOfTask)};
   const std::vector<int> fieldWidths = ofVariableParameters(context.fieldWidths, context.parameters);
-  const LocalSensitivity sensitivity = localSensitivity(settings, context.space, context.evaluator, fieldWidths);
+  LocalSensitivity sensitivity = localSensitivity(settings, context.space, context.evaluator, fieldWidths);
+  Linearised found;
+  if (settings.calculatesCovariance) found = linearised(context, sensitivity);
+  if (found.model) takeObservations(*found.model, sensitivity);
   const AnalysisNames names = analysisNames(context);
   outcome.report = formatSensitivity(sensitivity, names);
   outcome.tables = sensitivityTables(sensitivity, names);
-  if (settings.calculatesCovariance) addCovariance(context, sensitivity, outcome);
+  if (settings.calculatesCovariance) addCovariance(context, sensitivity.plan.sets.front(), found, outcome);
   logReport(context, outcome.report);
   return outcome;
 }

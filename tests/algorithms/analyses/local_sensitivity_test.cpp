@@ -164,6 +164,25 @@ TEST(LocalSensitivity, LeavesAFailedRunsColumnOutByName) {
   EXPECT_THAT(formatSensitivity(result, names), Contains("     3. p2                          NaN"));
 }
 
+// At the optimum the derivative of the error is 0 for the parameter that matters most.
+TEST(LocalSensitivity, RanksByTheObservationsWhereThereAreSome) {
+  FunctionEvaluator evaluator([](const ParameterSet& p) {
+    EvaluationResult result;
+    result.objectiveValues = {1.0 + (p[0] - 2.0) * (p[0] - 2.0) + 0.01 * p[1]};
+    return result;
+  });
+  const SearchSpace space = spaceOf({{kNone, 2, 0, 4}, {kNone, 1, 0, 10}});
+  LocalSensitivity result = localSensitivity({kCentral, kOfRange, 0.1}, space, evaluator);
+  EXPECT_THAT(result.ranking, ElementsAre(1, 0));
+  // Two weighted observations; the third, which is missing, does not count.
+  takeObservations({{0.5, -0.5, NAN}, {1, 4, 1}, {{3, 2, 9}, {0, 0.1, 9}}}, result);
+  EXPECT_THAT(result.ofObservations, ElementsAre(DoubleEq(4 * std::sqrt((9.0 + 16.0) / 2)), DoubleEq(std::sqrt(2.0))));
+  EXPECT_THAT(result.ranking, ElementsAre(0, 1));
+  const AnalysisNames names{space.names, {}, {"error"}};
+  EXPECT_THAT(formatSensitivity(result, names),
+              Contains(HasSubstr("Composite scaled sensitivity of the observations")));
+}
+
 TEST(LocalSensitivity, UsesTheOtherSideWhereOneFailed) {
   FunctionEvaluator evaluator([](const ParameterSet& p) {
     EvaluationResult result = evaluate(p);
