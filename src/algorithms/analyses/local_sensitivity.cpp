@@ -413,8 +413,12 @@ std::vector<std::string> formatSensitivity(const LocalSensitivity& sensitivity, 
     appendTable(lines, "Scaled sensitivities of " + what, outputs, names.parameters, table.scaled);
   };
   for (const EvaluationResult& result : sensitivity.results) {
+    constexpr double kRounding = 1.0 - 1.0e-6;  // of the statistics, in 32 bits
     const EvaluationResult& base = sensitivity.results.front();
-    if (!base.ok() || !result.ok() || !(result.aggregate < base.aggregate)) continue;
+    // A negative aggregate is no measure of a misfit.
+    if (!base.ok() || !result.ok() || !(result.aggregate >= 0.0 && result.aggregate < base.aggregate * kRounding)) {
+      continue;
+    }
     lines.push_back(
         fmt::format("Warning: evaluation {} fits better than the base set: its aggregate is {}, not {}; the "
                     "base set is not the best, and its derivatives and deviations mislead",

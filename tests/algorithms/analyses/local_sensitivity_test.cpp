@@ -168,7 +168,8 @@ TEST(LocalSensitivity, LeavesAFailedRunsColumnOutByName) {
 TEST(LocalSensitivity, RanksByTheObservationsWhereThereAreSome) {
   FunctionEvaluator evaluator([](const ParameterSet& p) {
     EvaluationResult result;
-    result.objectiveValues = {1.0 + (p[0] - 2.0) * (p[0] - 2.0) + 0.01 * p[1]};
+    result.objectiveValues = {1.0 + (p[0] - 2.0) * (p[0] - 2.0) + 0.25 * p[1]};
+    result.aggregate = result.objectiveValues[0];
     return result;
   });
   const SearchSpace space = spaceOf({{kNone, 2, 0, 4}, {kNone, 1, 0, 10}});
@@ -180,7 +181,9 @@ TEST(LocalSensitivity, RanksByTheObservationsWhereThereAreSome) {
   EXPECT_THAT(result.ranking, ElementsAre(0, 1));
   const AnalysisNames names{space.names, {}, {"error"}};
   EXPECT_THAT(formatSensitivity(result, names),
-              Contains(HasSubstr("Composite scaled sensitivity of the observations")));
+              AllOf(Contains(HasSubstr("Composite scaled sensitivity of the observations")),
+                    Contains(StartsWith("Warning: evaluation 4 fits better than the base set: its aggregate is 1, not "
+                                        "1.25;"))));
 }
 
 TEST(LocalSensitivity, UsesTheOtherSideWhereOneFailed) {
