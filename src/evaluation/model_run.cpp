@@ -92,7 +92,8 @@ ModelRunner::ModelRunner(ModelDescription description, ParameterModel& parameter
   for (std::size_t i = 0; i < description_.measures.size() && description_.keepSimulatedValues; ++i) {
     const OutputMeasure& measure = description_.measures[i];
     if (measure.interfaceType != InterfaceType::timeSeries) continue;
-    observedSeries_.push_back(readObservedSeries(i, measure, description_.period, series_.observation(i)));
+    observedSeries_.push_back(
+        readObservedSeries(i, measure, description_.period, description_.keptPrecision, series_.observation(i)));
   }
   if (launcherSettings.slotCount > 0 && !launcher_.initialise(launcherSettings)) {
     fatalError("Error: Unable to initialise MirevoSimpleLaunch", launcher_.lastError());
@@ -324,8 +325,8 @@ std::optional<EvaluationFailure> ModelRunner::readMeasures(int slot, EvaluationR
   }
   for (const ObservedSeries& observed : observedSeries_) {
     if (failure) break;
-    appendSimulatedValues(observed, description_.measures[observed.measure], series_.simulation(observed.measure),
-                          result.simulatedValues);
+    appendSimulatedValues(observed, description_.measures[observed.measure], description_.keptPrecision,
+                          series_.simulation(observed.measure), result.simulatedValues);
   }
   return failure;
 }

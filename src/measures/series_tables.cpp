@@ -84,7 +84,9 @@ void SeriesTables::checkItems(std::span<const OutputMeasure> measures, const Eva
     requireItem(observation(i), measures[i].observation);
     // Files in the base folder that have no time steps yet tell nothing about their columns.
     if (simulation(i).timeStepCount() < 1) {
-      needsPairs_[i] = !readObservedSeries(i, measures[i], period, observation(i)).values.empty();
+      const ObservedSeries observed =
+          readObservedSeries(i, measures[i], period, SeriesPrecision::single, observation(i));
+      needsPairs_[i] = !observed.values.empty();
       continue;
     }
     requireItem(simulation(i), measures[i].simulation);

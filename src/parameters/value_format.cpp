@@ -7,6 +7,8 @@
 
 #include <fmt/core.h>
 
+#include "common/text.h"
+
 namespace mirevo {
 namespace {
 
@@ -78,6 +80,10 @@ std::string FormatValueForPlaceholder(double value, int width) {
   text->resize(std::min(text->size(), static_cast<std::size_t>(w)));
   std::copy(text->begin(), text->end(), field.begin() + (w - static_cast<std::ptrdiff_t>(text->size())));
   return field;
+}
+
+std::optional<double> valueAsWritten(double value, int width) {
+  return parseReal(FormatValueForPlaceholder(value, width));
 }
 
 }  // namespace mirevo

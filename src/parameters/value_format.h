@@ -1,5 +1,6 @@
 #pragma once
 
+#include <optional>
 #include <string>
 
 namespace mirevo {
@@ -11,5 +12,8 @@ inline constexpr int kMaximumValueWidth = 20;
 /// min(width, 20) characters. Returns exactly `width` characters. Digits that do not fit are cut off, not rounded. A
 /// value whose exponent needs three digits, and one that is not a number, becomes "*" followed by blanks.
 std::string FormatValueForPlaceholder(double value, int width);
+
+/// The value that a model reads from a placeholder of this width; empty if that holds no number.
+std::optional<double> valueAsWritten(double value, int width);
 
 }  // namespace mirevo

@@ -245,6 +245,7 @@ void ReportBuilder::addAnalyses() {
   if (task.sensitivity == nullptr) return;
   data_.sensitivity = reportedSensitivity(config_, *task.sensitivity, space(), sources_.results.rows);
   if (!data_.sensitivity || !isFinished) return;
+  takeObservationComposites(filePrefix_, *data_.sensitivity);
   std::string fault;
   data_.sensitivity->covariance = reportedCovariance(filePrefix_, fault);
   if (!fault.empty()) note(fmt::format("The covariance is not shown: {}.", fault));

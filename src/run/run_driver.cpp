@@ -233,10 +233,10 @@ void RunDriver::openSeries() {
 
 TaskOutcome RunDriver::runTask() {
   if (!config_.task) return {std::string(kEndOfTask)};
-  TaskOutcome outcome = config_.task->run({parameters_->searchSpace(), config_.parameters, config_.measures,
-                                           config_.objectives, *evaluator_, state_.log,
-                                           [this](const SearchSummary& summary) { reporter_->takeBestOf(summary); },
-                                           filePrefix_, runner_->observedSeries()});
+  TaskOutcome outcome = config_.task->run(
+      {parameters_->searchSpace(), config_.parameters, config_.measures, config_.objectives, *evaluator_, state_.log,
+       [this](const SearchSummary& summary) { reporter_->takeBestOf(summary); }, filePrefix_, runner_->observedSeries(),
+       widestPlaceholders(runner_->templates(), config_.parameters.size())});
   for (const TaskFile& file : outcome.files) writeBesideResults(file.path, file.content);
   return outcome;
 }

@@ -16,6 +16,7 @@ class SensitivityTask final : public Task {
   std::string description() const override;
   int plannedEvaluations(std::size_t variableCount) const override;
   bool keepsSimulatedValues() const override { return settings.calculatesCovariance; }
+  SeriesPrecision keptPrecision() const override { return SeriesPrecision::exact; }
   TaskOutcome run(const TaskContext& context) override;
   TaskReport report() const override { return {.sensitivity = &settings}; }
 
