@@ -7,8 +7,8 @@ namespace {
 
 std::vector<RunFile> filesOfSetup() {
   using namespace run_files;
-  std::vector<RunFile> files{kLog,    kTerminationLog, kMessages,    kKill,         kSeries,
-                             kReport, kBand,           kSavedFolder, kFailedFolder, kProcessFolder};
+  std::vector<RunFile> files{kLog,  kTerminationLog, kMessages,     kKill,          kSeries,  kReport,
+                             kBand, kSavedFolder,    kFailedFolder, kProcessFolder, kRunLock, kProcessLock};
   for (const ResultFileNames& names : {kPlain, kSensitivity, kOptimisation}) {
     files.insert(files.end(), {names.results, names.restart, names.simulatedValues, names.record, names.failures});
     files.insert(files.end(), names.tables.begin(), names.tables.end());

@@ -44,6 +44,11 @@ inline constexpr RunFile kSavedFolder{"_Saved", ""};
 inline constexpr RunFile kFailedFolder{"_Failed", "", true};
 inline constexpr RunFile kProcessFolder{"_Process", "", true};
 
+/// What keeps a second run away (common/file_lock): from the files with the setup's name, and from the process folders,
+/// beside which it lies; the runs of a job share that.
+inline constexpr RunFile kRunLock{"", "._lock_"};
+inline constexpr RunFile kProcessLock{"_Process", "._lock_"};
+
 /// Tables of analyses.
 inline constexpr RunFile kCovariance{"_Covariance", ".dat", false, true};
 inline constexpr RunFile kCorrelation{"_Correlation", ".dat", false, true};

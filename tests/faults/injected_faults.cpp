@@ -39,6 +39,7 @@ constexpr ErrorOfCall kErrors[] = {{"open-to-write", ENOSPC, "once"},
                                    {"read", EIO, "once"},
                                    {"close", EIO, "once"},
                                    {"copy", ENOSPC, "lasting"},
+                                   {"lock", ENOLCK, "lasting"},
                                    {"fsync", EIO, "once"},
                                    {"chmod", EPERM, "once"},
                                    {"rename", EACCES, "once"},
@@ -67,6 +68,7 @@ std::string kindOf(const std::string& path) {
   if (isIn("basin.") && path.ends_with(".log")) return "run log";
   if (path == "basin._spi_") return "message file";
   if (path == "basin._kill_") return "kill file";
+  if (path.ends_with("._lock_")) return "lock";
   if (isIn("calSimErr")) return "failed-run file";
   if (path.find("_Failures.") != std::string::npos) return "failure table";
   if (path.find("_Run.") != std::string::npos) return "run record";
@@ -100,7 +102,8 @@ bool mayPassSilently(const Call& call) {
   if (name == "access" && path == "basin._kill_") return true;             // looked for again at once
   if (path.ends_with("mirevo_batch.log")) return name != "open-to-write";  // made anew
   if (name == "close" && (path == "basin._spi_" || path.ends_with("(deleted)"))) return true;  // another took its place
-  if (name == "open-to-read" && path == "basin.kdx") return true;  // to lock it; reading it follows
+  // What is left of a lock keeps nobody away, and what it says of its holder is for a message only.
+  if (path.ends_with("._lock_")) return name != "lock" && name != "open-to-write";
   // What cannot be compared is written anew, beside the one of before.
   const std::string kind = kindOf(path);
   if ((name == "read" || name == "open-to-read") && (kind == "band file" || kind == "analysis table")) return true;
