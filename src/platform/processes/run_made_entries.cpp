@@ -63,7 +63,9 @@ RunMadeEntries::RunMadeEntries(std::string folder, std::span<const std::string> 
 }
 
 bool RunMadeEntries::contains(std::string_view name) const {
-  if (!setups_.empty() && matches(name, run_files::kFailedRuns)) return true;
+  for (const RunFile& file : {run_files::kFailedRuns, run_files::kFailedRunsLock}) {
+    if (!setups_.empty() && matches(name, file)) return true;
+  }
   const auto owns = [&](const std::string& setup) { return belongsToRunOf(setup, name); };
   return std::any_of(setups_.begin(), setups_.end(), owns) || isProcessFolder(folder_ + "/" + std::string(name));
 }
