@@ -18,6 +18,8 @@ class Descriptor final {
   Descriptor(const Descriptor&) = delete;
   Descriptor& operator=(const Descriptor&) = delete;
   int get() const { return fd_; }
+  /// Leaves it open, for the caller to close.
+  int giveAway() { return std::exchange(fd_, -1); }
   /// Closes it now. False, with the reason in errno, when something that was written has not reached the file: a
   /// network file system may report only here that its disk is full.
   bool close() {

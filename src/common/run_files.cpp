@@ -7,8 +7,9 @@ namespace {
 
 std::vector<RunFile> filesOfSetup() {
   using namespace run_files;
-  std::vector<RunFile> files{kLog,    kTerminationLog, kMessages,    kKill,         kSeries,
-                             kReport, kBand,           kSavedFolder, kFailedFolder, kProcessFolder};
+  std::vector<RunFile> files{kLog,     kTerminationLog, kMessages,     kKill,         kSeries,
+                             kReport,  kBand,           kSavedFolder,  kFailedFolder, kProcessFolder,
+                             kRunLock, kProcessLock,    kOwnFailedRuns};
   for (const ResultFileNames& names : {kPlain, kSensitivity, kOptimisation}) {
     files.insert(files.end(), {names.results, names.restart, names.simulatedValues, names.record, names.failures});
     files.insert(files.end(), names.tables.begin(), names.tables.end());
@@ -34,9 +35,8 @@ std::string runFilePath(std::string_view prefix, const RunFile& file, int number
   return std::string(prefix).append(file.stem).append(std::to_string(number)).append(file.extension);
 }
 
-std::string failedRunsPath(std::string_view prefix) {
-  const std::string_view folder = prefix.substr(0, prefix.rfind('/') + 1);
-  return runFilePath(folder, run_files::kFailedRuns);
+std::string pathBeside(std::string_view prefix, const RunFile& file) {
+  return runFilePath(prefix.substr(0, prefix.rfind('/') + 1), file);
 }
 
 std::string fileNameOf(std::string_view path) {

@@ -44,6 +44,11 @@ inline constexpr RunFile kSavedFolder{"_Saved", ""};
 inline constexpr RunFile kFailedFolder{"_Failed", "", true};
 inline constexpr RunFile kProcessFolder{"_Process", "", true};
 
+/// What keeps a second run away (common/file_lock): from the files with the setup's name, and from the process folders,
+/// beside which it lies; the runs of a job share that.
+inline constexpr RunFile kRunLock{"", "._lock_"};
+inline constexpr RunFile kProcessLock{"_Process", "._lock_"};
+
 /// Tables of analyses.
 inline constexpr RunFile kCovariance{"_Covariance", ".dat", false, true};
 inline constexpr RunFile kCorrelation{"_Correlation", ".dat", false, true};
@@ -66,8 +71,11 @@ inline constexpr ResultFileNames kOptimisation{{"_Optimisation", ".dat"},       
                                                {"_Optimisation_Simulated", ".bin"}, {"_Optimisation_Run", ".dat"},
                                                {"_Optimisation_Failures", ".dat"},  {}};
 
-/// Stands beside the setup without its name.
+/// Stands beside the setup without its name, for the run that was the first of those going on in the folder; another
+/// has a file of its own.
 inline constexpr RunFile kFailedRuns{"calSimErr", ".dat"};
+inline constexpr RunFile kFailedRunsLock{"calSimErr", "._lock_"};
+inline constexpr RunFile kOwnFailedRuns{"_calSimErr", ".dat"};
 
 }  // namespace run_files
 
@@ -78,8 +86,8 @@ std::span<const RunFile> runFilesOfSetup();
 std::string runFilePath(std::string_view prefix, const RunFile& file);
 /// That of a numbered one.
 std::string runFilePath(std::string_view prefix, const RunFile& file, int number);
-/// `calSimErr.dat` beside the setup.
-std::string failedRunsPath(std::string_view prefix);
+/// That of a file beside the setup without its name, `calSimErr.dat`.
+std::string pathBeside(std::string_view prefix, const RunFile& file);
 /// The file's name without a folder, for messages: `calSimErr.dat`, `basin_Failures.dat`.
 std::string fileNameOf(std::string_view path);
 

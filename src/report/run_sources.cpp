@@ -9,9 +9,9 @@
 
 #include <fmt/core.h>
 
+#include "common/file_lock.h"
 #include "common/files.h"
 #include "common/run_files.h"
-#include "run/results/run_lock.h"
 
 namespace mirevo {
 namespace {
@@ -65,7 +65,7 @@ std::optional<RunSources> readRunSources(const RunConfig& config, const SearchSp
   sources.results = readResultTable(*text, resultColumns(config, space));
   putInOrder(sources.results.rows);
   auto record = readRecord(runFilePath(filePrefix, names->record), sources.recordFault);
-  const bool isGoingOn = RunLock::isHeld(config.setupFile);
+  const bool isGoingOn = FileLock::isHeld(runFilePath(filePrefix, run_files::kRunLock));
   if (record && !record->stage && !isGoingOn && !sources.results.closingLines.empty()) {
     sources.recordFault = fileNameOf(runFilePath(filePrefix, names->record)) + ": it lacks its end";
     record.reset();

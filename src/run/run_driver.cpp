@@ -18,6 +18,7 @@
 #include "evaluation/ranks/rank_evaluator.h"
 #include "measures/period_series.h"
 #include "platform/processes/posix_process_launcher.h"
+#include "platform/processes/process_folder.h"
 #include "platform/signals/signal_state.h"
 #include "platform/terminal/front_end.h"
 #include "report/run_report.h"
@@ -35,7 +36,6 @@ namespace mirevo {
 namespace {
 
 using progress::kNormalTermination;
-constexpr double kPatienceSeconds = 3.0;  ///< longest wait for an earlier run of the setup that is just ending
 
 std::string environmentValue(const char* name) {
   const char* value = std::getenv(name);
@@ -99,9 +99,10 @@ void RunDriver::openRun(const std::string& setupFileName) {
     // The run's files would be those of that setup, of which a run may be going on.
     fatalError("Error: Unable to open " + setup.file, fmt::format("{}; did you mean {}?", fault, meant));
   }
-  if (!lock_.take(setup.file, kPatienceSeconds)) {
+  if (!runLock_.take(runFilePath(filePrefix_, run_files::kRunLock), {}, kLockPatienceSeconds)) {
     fatalError("Error: Another run of this setup is in progress",
-               setup.file + ": both would work in the same folders. Wait for it, or run a copy under another name.");
+               fmt::format("{}: another run{} writes the files {}*. Wait for it, or run a copy under another name.",
+                           setup.file, runLock_.holder(), filePrefix_));
   }
   const std::string logFile = runFilePath(filePrefix_, run_files::kLog);
   const std::string keptLog = RunLog::isOfRefusedSetup(logFile) ? std::string() : keepEarlierFile(logFile);
@@ -122,11 +123,34 @@ void RunDriver::openRun(const std::string& setupFileName) {
   state_.log.passWarningsTo([this](std::string_view text) { state_.progress.writeMessage(text); });
   for (const std::string_view problems :
        {std::string_view(terminationLogProblem), std::string_view(progressProblems)}) {
-    for (const std::string_view problem : splitLines(problems)) {
-      state_.log.warning(problem);
-      showMessage(problem, {}, MessageType::warning);
+    for (const std::string_view problem : splitLines(problems)) warn(problem);
+  }
+  if (!runLock_.warning().empty()) warn(runLock_.warning());
+}
+
+/// In the log and to the user.
+void RunDriver::warn(std::string_view text) {
+  state_.log.warning(text);
+  showMessage(text, {}, MessageType::warning);
+}
+
+/// The workers lock the process folders, each its own, on the machine where that is. The master, which begins earlier,
+/// finds out whether another run works in any of them and whether they can be locked.
+void RunDriver::lockProcessFoldersOfJob(const std::string& prefix) {
+  std::error_code ignored;
+  if (!std::filesystem::is_directory(std::filesystem::path(prefix).parent_path(), ignored)) return;  // only there
+  const std::string path = processLockPath(prefix);
+  {
+    FileLock all;
+    if (!all.take(path, {0, state_.job->processCount()}, kLockPatienceSeconds)) {
+      fatalError("Error: Another run works in the same process folders", processFoldersInUse(prefix, all.holder()));
     }
   }
+  if (!processLock_.take(path, {}, kLockPatienceSeconds)) {
+    fatalError("Error: Another run works in the same process folders",
+               processFoldersInUse(prefix, processLock_.holder()));
+  }
+  if (!processLock_.warning().empty()) warn(processLock_.warning());
 }
 
 void RunDriver::buildModel() {
@@ -139,6 +163,8 @@ void RunDriver::buildModel() {
   signalState.haltProcesses = haltProcessesFromSignal;
   const int slotCount = state_.job->hasWorkers() ? 0 : config_.simultaneousSimulations;  // the master runs no model
   LauncherSettings settings = launcherSettings(config_, slotCount);
+  settings.warn = [this](std::string_view text) { warn(text); };
+  if (state_.job->hasWorkers()) lockProcessFoldersOfJob(settings.processFolderPrefix);
   settings.isCancelled = [this] {  // copying a large model takes time
     if (!state_.progress.isCancelled()) return false;
     state_.log.line("Simulation cancelled");

@@ -7,13 +7,13 @@
 #include <string_view>
 
 #include "common/clock.h"
+#include "common/file_lock.h"
 #include "evaluation/evaluator.h"
 #include "evaluation/failed_run_policy.h"
 #include "evaluation/model_run.h"
 #include "measures/objective_functions.h"
 #include "parameters/parameter_model.h"
 #include "platform/processes/process_launcher.h"
-#include "run/results/run_lock.h"
 #include "run/results/run_results.h"
 #include "run/results/series_recorder.h"
 #include "run/run_reporter.h"
@@ -52,6 +52,8 @@ class RunDriver final {
   /// Joins the job of the run. Throws FatalError like joinJob().
   void startJob();
   void openRun(const std::string& setupFileName);
+  void warn(std::string_view text);
+  void lockProcessFoldersOfJob(const std::string& prefix);
   void buildModel();
   void logSetup();
   void openResults();
@@ -77,7 +79,8 @@ class RunDriver final {
   std::vector<std::string> closingLines(const Ending& ending) const;
 
   RunState state_;
-  RunLock lock_;
+  FileLock runLock_;         ///< on the files with the setup's name
+  FileLock processLock_;     ///< the master's, on the process folders of the job
   bool isAccepted_ = false;  ///< the setup: from now on files of earlier runs are touched
   std::string filePrefix_;   ///< folder and name of the setup, without ".kdx": the beginning of the paths of the run's
                              ///< files

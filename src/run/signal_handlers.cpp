@@ -9,6 +9,7 @@
 #include <ucontext.h>
 #include <unistd.h>
 
+#include "common/file_lock.h"
 #include "common/progress_messages.h"
 #include "platform/signals/signal_state.h"
 #include "platform/terminal/front_end.h"
@@ -68,6 +69,7 @@ bool isRequest(int signalNumber) noexcept {
     showFromSignal(STDOUT_FILENO, message, {});
   }
   if (terminationLog > 0) writeLineFromSignal(terminationLog, "Abnormal completion");
+  FileLock::removeFilesFromSignal();
   ::_exit(128 + signalNumber);
 }
 

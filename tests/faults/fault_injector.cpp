@@ -229,6 +229,16 @@ int ioctl(int descriptor, unsigned long request, ...) {
   return failsOn("copy", descriptor) ? -1 : real(descriptor, request, argument);
 }
 
+int fcntl(int descriptor, int command, ...) {
+  va_list arguments;
+  va_start(arguments, command);
+  void* argument = va_arg(arguments, void*);
+  va_end(arguments);
+  static auto* const real = original<int(int, int, ...)>("fcntl");
+  const bool locks = command == F_OFD_SETLK && static_cast<struct flock*>(argument)->l_type == F_WRLCK;
+  return locks && failsOn("lock", descriptor) ? -1 : real(descriptor, command, argument);
+}
+
 ssize_t write(int descriptor, const void* bytes, size_t count) {
   static auto* const real = original<ssize_t(int, const void*, size_t)>("write");
   if (shortWriteWasMade) {

@@ -30,6 +30,7 @@ const std::map<std::string, std::vector<std::pair<int, const char*>>>& errorsOfC
       {"read", {{EIO, "once"}}},
       {"close", {{EIO, "once"}}},
       {"copy", {{ENOSPC, "lasting"}}},
+      {"lock", {{ENOLCK, "lasting"}}},
       {"fsync", {{EIO, "once"}}},
       {"chmod", {{EPERM, "once"}}},
       {"rename", {{EACCES, "once"}, {EIO, "once"}}},
@@ -53,6 +54,7 @@ constexpr std::pair<const char*, const char*> kKinds[] = {{"_Restart.dat", "rest
                                                           {"_Simulated.bin", "simulated values"},
                                                           {"basin._spi_", "message file"},
                                                           {"basin._kill_", "kill file"},
+                                                          {"._lock_", "lock"},
                                                           {"calSimErr", "failed-run file"},
                                                           {"_Failures.", "failure table"},
                                                           {"_Run.", "run record"},
@@ -90,7 +92,8 @@ bool mayPassSilently(const Call& call) {
   if (name == "access" && path == "basin._kill_") return true;             // looked for again at once
   if (path.ends_with("mirevo_batch.log")) return name != "open-to-write";  // made anew
   if (name == "close" && (path == "basin._spi_" || path.ends_with("(deleted)"))) return true;  // another took its place
-  if (name == "open-to-read" && path == "basin.kdx") return true;  // to lock it; reading it follows
+  // What is left of a lock keeps nobody away, and what it says of its holder is for a message only.
+  if (path.ends_with("._lock_")) return name != "lock" && name != "open-to-write";
   // What cannot be compared is written anew, beside the one of before.
   const std::string kind = kindOf(path);
   if ((name == "read" || name == "open-to-read") && (kind == "band file" || kind == "analysis table")) return true;

@@ -47,16 +47,48 @@ TEST_F(Interruption, ASignalOrAKillFileEndsTheRunWithItsMessageAndNothingIsLeft)
   }
 }
 
-TEST_F(Interruption, ASetupThatIsBeingRunIsNotRunASecondTime) {
+TEST_F(Interruption, ASecondRunOfTheSameFilesOrFoldersIsRefused) {
+  folder_.write("other/x", "");
+  folder_.editSetup("ProcessFolder = ''", fmt::format("ProcessFolder = '{}'", folder_ / "other"));
+  const auto processFolder = [&] {
+    for (const auto& entry : std::filesystem::directory_iterator(folder_ / "other")) {
+      if (entry.path().string().ends_with("_Process1")) return entry.path().string();
+    }
+    return std::string();
+  };
   RunningProgram program({setup_});
-  waitForGrandchild();
   ASSERT_TRUE(waitUntil([&] { return folder_.read("basin.log").ends_with("No. 2 initiated\n"); }));
   const std::string log = folder_.read("basin.log");
-  const ProgramResult second = runProgram({setup_});
-  EXPECT_EQ(second.exitCode, 1);
-  EXPECT_THAT(second.error, HasSubstr("Error: Another run of this setup is in progress"));
+  folder_.write("new", folder_.read("basin.kdx"));  // as an editor saves
+  std::filesystem::rename(folder_ / "new", setup_);
+  folder_.write("basin.KDX", folder_.read("basin.kdx"));
+  for (const std::string& setup : {setup_, folder_ / "basin.KDX"}) {
+    const ProgramResult second = runProgram({setup});
+    EXPECT_EQ(second.exitCode, 1);
+    EXPECT_THAT(second.error, ::testing::ContainsRegex("Error: Another run of this setup is in progress\n.*/basin.* "
+                                                       "another run \\(process [0-9]+ on [^)]*\\) writes the files"));
+  }
   EXPECT_EQ(folder_.read("basin.log"), log);
   EXPECT_FALSE(folder_.exists("basin.1.log"));
+
+  // Another setup whose process folders have the same names.
+  const std::string first = processFolder();
+  folder_.editSetup(fmt::format("ProcessFolder = '{}'", folder_ / "other"), "ProcessFolder = ''");
+  std::string text = folder_.read("basin.kdx");
+  for (const char* file : {"model/", "observed.csv"}) {
+    for (auto at = text.find(file); at != std::string::npos; at = text.find(file, at + 4)) text.insert(at, "../");
+  }
+  const std::string name = first.substr(0, first.size() - std::string("_Process1").size());
+  folder_.write(name.substr(folder_.path().size() + 1) + ".kdx", text);
+  const ProgramResult third = runProgram({name + ".kdx"});
+  EXPECT_EQ(third.exitCode, 1);
+  EXPECT_THAT(third.error, HasSubstr(fmt::format("works in a folder {}_Process<number>", name)));
+  EXPECT_TRUE(std::filesystem::exists(first + "/first")) << "the folder of the first run was made afresh";
+
+  program.send(SIGTERM);
+  program.wait();
+  EXPECT_FALSE(folder_.exists("basin._lock_"));
+  EXPECT_FALSE(std::filesystem::exists(name + "_Process._lock_"));
 }
 
 }  // namespace

@@ -137,5 +137,34 @@ TEST(FailedRuns, ARunWithItsStandardOutputsClosedLeavesTheSameResults) {
   EXPECT_EQ(withoutDates(folder.read("basin.dat")), results);
 }
 
+TEST(FailedRuns, OfTwoSetupsInAFolderAtOnceEachAreDescribed) {
+  const ModelFolder folder;
+  folder.useScript(
+      fmt::format("case $PWD in */basin_Process1) while grep -q '^a = *2$' parameters.txt && ! test -e '{}'; "
+                  "do sleep 0.01; done;; esac",
+                  folder / "go"));
+  RunSettings settings{.option = 0, .modelArguments = "--fail-above 8"};
+  settings.scenarios = scenarios(10);
+  std::swap(settings.scenarios.front(), settings.scenarios.back());  // the one that fails
+  settings.scenarios[1] = "2, 1, 1";
+  folder.writeSetup(settings);
+  const std::string other = folder.write("other.kdx", folder.read("basin.kdx"));
+  folder.write("calSimErr.dat", "# Failed evaluations of another\n");
+  RunningProgram first({folder / "basin.kdx"});
+  ASSERT_TRUE(waitUntil([&] { return folder.read("calSimErr.dat").ends_with("is too large\n"); }));
+  const std::string failures = folder.read("calSimErr.dat");
+  EXPECT_EQ(runProgram({other}).exitCode, 0);
+  EXPECT_EQ(folder.read("calSimErr.dat"), failures);
+  EXPECT_EQ(folder.read("calSimErr.1.dat"), "# Failed evaluations of another\n");
+  EXPECT_THAT(folder.read("other_calSimErr.dat"), StartsWith("# Failed evaluations of other\n\nEvaluation No. 1 "));
+  EXPECT_THAT(folder.read("other.log"), HasSubstr("of this one are described in other_calSimErr.dat\n"));
+  folder.write("go", "");
+  EXPECT_EQ(first.wait().exitCode, 0);
+  EXPECT_EQ(runProgram({other}).exitCode, 0);
+  EXPECT_THAT(folder.read("calSimErr.dat"), StartsWith("# Failed evaluations of other\n"));
+  EXPECT_TRUE(folder.exists("other_calSimErr.1.dat")) << "or it would be taken for the run's";
+  EXPECT_FALSE(folder.exists("calSimErr._lock_"));
+}
+
 }  // namespace
 }  // namespace mirevo::testing

@@ -149,7 +149,7 @@ TEST_F(ViewerTest, CancellingARunThatIsOnlyStartingLeavesAnotherRunAlone) {
     run = std::atoi(TemporaryFolder::readFile(fmt::format("/proc/{0}/task/{0}/children", viewer.process())).c_str());
     std::error_code gone;
     for (const auto& open : std::filesystem::directory_iterator(fmt::format("/proc/{}/fd", run), gone)) {
-      if (std::filesystem::read_symlink(open, gone) == setup) return true;
+      if (std::filesystem::read_symlink(open, gone) == folder_ / "basin._lock_") return true;
     }
     return false;
   }));

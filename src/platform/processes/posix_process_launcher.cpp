@@ -149,6 +149,7 @@ bool PosixProcessLauncher::initialise(const LauncherSettings& settings) {
     std::string reason;
     if (!guard_->start(*groups_, mark_, reason))
       fatalError("Unable to start the guard of the model's processes: " + reason);
+    lockFolders(settings);
     slots_.reserve(static_cast<std::size_t>(settings.slotCount));
     for (int number = 1; number <= settings.slotCount; ++number) {
       if (settings.isCancelled && settings.isCancelled()) throw RunCancelled();
@@ -165,6 +166,17 @@ bool PosixProcessLauncher::initialise(const LauncherSettings& settings) {
   return true;
 }
 
+void PosixProcessLauncher::lockFolders(const LauncherSettings& settings) {
+  const std::string& prefix = settings.processFolderPrefix;
+  std::error_code failed;  // noticed when the first folder is made
+  std::filesystem::create_directories(std::filesystem::path(prefix).parent_path(), failed);
+  const FileLock::Range folders{settings.firstFolderNumber, settings.slotCount};
+  if (!lock_.take(processLockPath(prefix), folders, kLockPatienceSeconds)) {
+    fatalError(processFoldersInUse(prefix, lock_.holder()));
+  }
+  if (settings.warn && !lock_.warning().empty()) settings.warn(lock_.warning());
+}
+
 void PosixProcessLauncher::prepareSlot(const LauncherSettings& settings, int number,
                                        const std::vector<std::vector<std::string>>& arguments) {
   Slot& slot = slots_.emplace_back();
@@ -179,7 +191,6 @@ void PosixProcessLauncher::prepareSlot(const LauncherSettings& settings, int num
     fatalError(fmt::format("The model's folder {} lies in the process folder {}, which is made anew for every run",
                            settings.baseFolder, slot.folder));
   }
-  std::filesystem::create_directories(std::filesystem::path(slot.folder).parent_path(), failed);
   makeProcessFolder(settings.baseFolder, slot.folder, settings.processFolderPrefix);
   if (!renewLog(slot)) {
     fatalError(fmt::format("Unable to create {}/{}: {}", slot.folder, kBatchLogName, std::strerror(errno)));

@@ -10,6 +10,7 @@
 #include <vector>
 
 #include "common/clock.h"
+#include "common/file_lock.h"
 #include "platform/processes/child_guard.h"
 #include "platform/processes/process_groups.h"
 #include "platform/processes/process_launcher.h"
@@ -58,6 +59,7 @@ class PosixProcessLauncher final : public ProcessLauncher {
 
   Slot& slotAt(int slot) { return slots_.at(static_cast<std::size_t>(slot - 1)); }
   const Slot& slotAt(int slot) const { return slots_.at(static_cast<std::size_t>(slot - 1)); }
+  void lockFolders(const LauncherSettings& settings);
   void prepareSlot(const LauncherSettings& settings, int number,
                    const std::vector<std::vector<std::string>>& arguments);
   void prepareEnvironment(bool useSingleThread);
@@ -72,6 +74,7 @@ class PosixProcessLauncher final : public ProcessLauncher {
   std::atomic<pid_t>& groupEntry(const Slot& slot) const;
 
   std::string lastError_;
+  FileLock lock_;  ///< on the process folders
   MonotonicClock clock_;
   double graceSeconds_ = 0.0;
   double maxSeconds_ = 0.0;

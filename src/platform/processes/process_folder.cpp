@@ -20,6 +20,7 @@
 #include "common/fatal_error.h"
 #include "common/file_copy.h"
 #include "common/paths.h"
+#include "common/run_files.h"
 #include "common/take_text.h"
 #include "platform/processes/run_made_entries.h"
 
@@ -151,9 +152,8 @@ class ProcessFolderNames final {
     return isKnown_ && folder.st_dev == parent_.st_dev && folder.st_ino == parent_.st_ino;
   }
   bool contains(std::string_view name) const {
-    if (!name.starts_with(beginning_)) return false;
-    name.remove_prefix(beginning_.size());
-    return !takeDigits(name).empty() && name.empty();
+    if (!takeText(name, beginning_)) return false;
+    return name == run_files::kProcessLock.extension || (!takeDigits(name).empty() && name.empty());
   }
 
  private:
@@ -238,6 +238,17 @@ class FolderCopy final {
 };
 
 }  // namespace
+
+std::string processLockPath(std::string_view processFolderPrefix) {
+  return std::string(processFolderPrefix).append(run_files::kProcessLock.extension);
+}
+
+std::string processFoldersInUse(std::string_view processFolderPrefix, std::string_view holder) {
+  return fmt::format(
+      "Another run{} works in a folder {}<number>. Wait for it, or give one of the runs another name or "
+      "ProcessFolder.",
+      holder, processFolderPrefix);
+}
 
 void makeProcessFolder(const std::string& source, const std::string& target, std::string_view processFolderPrefix) {
   removeTree(target);

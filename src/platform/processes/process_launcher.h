@@ -3,6 +3,7 @@
 #include <cstdint>
 #include <functional>
 #include <string>
+#include <string_view>
 #include <vector>
 
 namespace mirevo {
@@ -18,8 +19,9 @@ struct LauncherSettings {
   std::string processFolderPrefix;    ///< absolute; the slot's folder without its number, which follows
   std::vector<BatchItem> batchItems;  ///< at least one
   int slotCount = 1;
-  int firstFolderNumber = 1;               ///< number of the folder of slot 1; those of the other slots follow
-  bool useSingleThread = false;            ///< sets the usual thread-count variables to 1 for the model
+  int firstFolderNumber = 1;                        ///< number of the folder of slot 1; those of the other slots follow
+  bool useSingleThread = false;                     ///< sets the usual thread-count variables to 1 for the model
+  std::function<void(std::string_view)> warn = {};  ///< takes what the user should know
   std::function<bool()> isCancelled = {};  ///< called between the folders of two slots; true throws RunCancelled
   double graceSeconds = 2.0;               ///< between SIGTERM and SIGKILL when processes are halted
   double maxSeconds = 0.0;  ///< longest time that a slot's batch may run, all items together; 0: no limit

@@ -41,12 +41,13 @@ bool namesThisProgram(const std::string& path) {
   });
 }
 
-/// Whether this is a process folder of a setup in another folder.
+/// Whether this is a process folder of a setup in another folder, or the lock on such folders.
 bool isProcessFolder(const std::string& path) {
   constexpr std::string_view kMark = run_files::kProcessFolder.stem;
   const auto mark = path.rfind(kMark);
   if (mark == std::string::npos) return false;
   std::string_view number = std::string_view(path).substr(mark + kMark.size());
+  if (number == run_files::kProcessLock.extension) return true;
   struct stat status {};
   return !takeDigits(number).empty() && number.empty() && ::stat((path + "/" + kBatchLogName).c_str(), &status) == 0;
 }
@@ -62,7 +63,9 @@ RunMadeEntries::RunMadeEntries(std::string folder, std::span<const std::string> 
 }
 
 bool RunMadeEntries::contains(std::string_view name) const {
-  if (!setups_.empty() && matches(name, run_files::kFailedRuns)) return true;
+  for (const RunFile& file : {run_files::kFailedRuns, run_files::kFailedRunsLock}) {
+    if (!setups_.empty() && matches(name, file)) return true;
+  }
   const auto owns = [&](const std::string& setup) { return belongsToRunOf(setup, name); };
   return std::any_of(setups_.begin(), setups_.end(), owns) || isProcessFolder(folder_ + "/" + std::string(name));
 }

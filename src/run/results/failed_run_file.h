@@ -14,11 +14,11 @@ namespace mirevo {
 
 /// Where the failures of a run are kept.
 struct FailedRunPaths {
-  std::string forPeople;  ///< `calSimErr.dat`
+  std::string forPeople;  ///< `calSimErr.dat`, or a file of the setup's own while another run has that
   std::string table;      ///< `<setup>_Failures.dat` or, of the task, its like
 };
 
-/// What is needed to find out why model runs failed: `calSimErr.dat` for a person, a table for programs. They appear
+/// What is needed to find out why model runs failed: a file for a person, a table for programs. They appear
 /// with the first failure, so that a run without failures leaves none.
 class FailedRunFile final {
  public:
@@ -28,6 +28,8 @@ class FailedRunFile final {
                 std::vector<std::string> tableHead);
 
   const FailedRunPaths& paths() const { return paths_; }
+  /// Before the first failure: puts another file in the place of `calSimErr.dat`.
+  void describeIn(const std::string& pathForPeople) { paths_.forPeople = pathForPeople; }
 
   /// What an interrupted run has left of its failures.
   struct Earlier {

@@ -57,7 +57,8 @@ RunResults::RunResults(const RunConfig& config, const SearchSpace& space, const 
       columns_(resultColumns(config, space)),
       names_(namesOf(config)),
       files_(restartFiles(filePrefix, names_)),
-      failedRuns_({failedRunsPath(filePrefix), files_.failures}, config.setupName, space.names, tableHead_),
+      failedRuns_({pathBeside(filePrefix, run_files::kFailedRuns), files_.failures}, config.setupName, space.names,
+                  tableHead_),
       record_(files_.record, tableHead_) {
   if (config.task && config.restart != RestartMode::startAfresh) {
     auto record = record_.readEarlier();
@@ -76,6 +77,7 @@ std::vector<EarlierSearch> RunResults::earlierSearches() const {
 void RunResults::open(const RunConfig& config, std::span<const ObservedSeries> observed,
                       const ObjectiveAggregator& aggregator, RunLog& log) {
   if (!config.task) return;
+  lockFailedRuns(log);
   if (config.keepsSimulatedValues()) {
     std::size_t count = 0;
     for (const ObservedSeries& series : observed) count += series.values.size();
@@ -88,6 +90,19 @@ void RunResults::open(const RunConfig& config, std::span<const ObservedSeries> o
       log.line("Restart: there are no earlier results to go on from, the run begins anew");
     startAfresh(config, log);
   }
+}
+
+/// `calSimErr.dat` is one per folder, and runs of several setups may be going on in it.
+void RunResults::lockFailedRuns(RunLog& log) {
+  const std::string own = runFilePath(filePrefix_, run_files::kOwnFailedRuns);
+  if (failedRunsLock_.take(pathBeside(filePrefix_, run_files::kFailedRunsLock), {}, 0.0)) {
+    if (!failedRunsLock_.warning().empty()) log.warning(failedRunsLock_.warning());
+    keepEarlierFile(own);  // it would be taken for this run's
+    return;
+  }
+  log.line(fmt::format("{} is that of another run{} in this folder: failed evaluations of this one are described in {}",
+                       fileNameOf(failedRuns_.paths().forPeople), failedRunsLock_.holder(), fileNameOf(own)));
+  failedRuns_.describeIn(own);
 }
 
 void RunResults::close() {

@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "common/data_table.h"
+#include "common/file_lock.h"
 #include "evaluation/earlier_evaluations.h"
 #include "measures/objective_functions.h"
 #include "measures/observed_series.h"
@@ -54,6 +55,7 @@ class RunResults final {
   EarlierEvaluations* earlierEvaluations() { return earlierEvaluations_ ? &*earlierEvaluations_ : nullptr; }
 
  private:
+  void lockFailedRuns(RunLog& log);
   void startAfresh(const RunConfig& config, RunLog& log);
   void keepEarlierFiles(const RunConfig& config, RunLog& log) const;
   void goOn(const RunConfig& config, const ObjectiveAggregator& aggregator, RunLog& log);
@@ -66,6 +68,7 @@ class RunResults final {
   RestartFiles files_;
   std::optional<EarlierRun> earlierRun_;
   ResultFile table_;
+  FileLock failedRunsLock_;  ///< on `calSimErr.dat`
   FailedRunFile failedRuns_;
   RunRecordFile record_;
   std::optional<SimulatedValuesFile> simulatedValues_;

@@ -248,6 +248,7 @@ TEST_F(PosixProcessLauncherTest, NothingOutlivesTheProgram) {
       "trap '' TERM\nsetsid sh -c 'echo $$ >daemon.txt; exec sleep 600' &\n"
       "while ! [ -s daemon.txt ]; do sleep 0.01; done\n" MIREVO_TEST_MODEL
       " --grandchild id.txt --ignore-term 1 --sleep-ms 3600000\necho never >never.txt");
+  settings_.processFolderPrefix = folder_ / "left_Process";  // not the folders of the fixture's launcher
   settings_.slotCount = 2;
   for (const auto& [name, end] : cases) {
     const pid_t program = ::fork();
@@ -256,14 +257,14 @@ TEST_F(PosixProcessLauncherTest, NothingOutlivesTheProgram) {
       if (!launcher.initialise(settings_)) ::_exit(9);
       launcher.createProcesses(1);
       launcher.createProcesses(2);
-      waitUntil([&] { return hasContent("run_Process1/id.txt") && hasContent("run_Process2/id.txt"); });
+      waitUntil([&] { return hasContent("left_Process1/id.txt") && hasContent("left_Process2/id.txt"); });
       end();
       ::_exit(9);
     }
     int status = 0;
     ASSERT_EQ(::waitpid(program, &status, 0), program);
     EXPECT_FALSE(WIFEXITED(status) && WEXITSTATUS(status) == 9) << name;
-    for (const char* slot : {"run_Process1", "run_Process2"}) {
+    for (const char* slot : {"left_Process1", "left_Process2"}) {
       for (const char* file : {"/id.txt", "/daemon.txt"}) {
         const std::string id = folder_.read(slot + std::string(file));
         ASSERT_FALSE(id.empty()) << name;
