@@ -18,6 +18,7 @@
 #include "common/files.h"
 #include "common/text.h"
 #include "measures/measure_file.h"
+#include "parameters/template_doubts.h"
 #include "platform/processes/process_folder.h"
 
 namespace mirevo {
@@ -146,8 +147,14 @@ std::vector<std::string> ModelRunner::readTemplates() {
     const auto text = readTextFile(name, reason);
     if (!text)
       fatalError((isNumericId ? "Error: Unable to open " : "Error: Unable to open template file ") + name, reason);
-    converted.push_back(isNumericId ? ConvertIdTemplate(name, *text, parameters) : std::string());
-    templates_.emplace_back(name, isNumericId ? converted.back() : *text, parameters, isNumericId);
+    try {
+      converted.push_back(isNumericId ? ConvertIdTemplate(name, *text, parameters) : std::string());
+      templates_.emplace_back(name, isNumericId ? converted.back() : *text, parameters, isNumericId);
+    } catch (const FatalError& error) {
+      fatalError(error.message(), error.detail() + hintOnMisreadTemplate(item.templateType, *text, parameters));
+    }
+    const std::vector<std::string> doubts = templateDoubts(templates_.back(), item.templateType, *text, parameters);
+    templateWarnings_.insert(templateWarnings_.end(), doubts.begin(), doubts.end());
   }
   return converted;
 }

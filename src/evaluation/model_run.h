@@ -75,6 +75,8 @@ class ModelRunner final {
   /// The observed series of each of shownMeasures().
   std::vector<PeriodSeries> readShownObservations();
   const std::vector<ParameterTemplate>& templates() const { return templates_; }
+  /// templateDoubts() of all templates.
+  const std::vector<std::string>& templateWarnings() const { return templateWarnings_; }
 
  private:
   /// Paths of one slot's copies of the model's files.
@@ -105,6 +107,7 @@ class ModelRunner final {
   ProcessLauncher& launcher_;
   std::string processFolderPrefix_;
   std::vector<ParameterTemplate> templates_;  ///< one per parameter file
+  std::vector<std::string> templateWarnings_;
   SeriesTables series_;
   SavedFiles savedFiles_;
   std::vector<ObservedSeries> observedSeries_;

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <iterator>
 #include <limits>
 #include <optional>
 
@@ -9,6 +10,7 @@
 
 #include "common/fatal_error.h"
 #include "common/text.h"
+#include "parameters/template_doubts.h"
 #include "parameters/template_file.h"
 #include "parameters/template_lines.h"
 
@@ -95,6 +97,26 @@ std::string convertLine(std::string_view templateName, std::size_t lineNumber, s
 }
 
 }  // namespace
+
+std::optional<FoundIdValue> findIdValue(std::string_view text, std::span<const ModelParameter> parameters) {
+  std::vector<ModelParameter> withIds;
+  std::copy_if(parameters.begin(), parameters.end(), std::back_inserter(withIds),
+               [](const ModelParameter& parameter) { return parameter.idValue != 0.0; });
+  std::size_t number = 0;
+  for (const std::string_view line : splitLines(text)) {
+    ++number;
+    std::size_t length = 0;
+    if (!findIdSuffix(line, length)) continue;
+    for (std::size_t from = line.find_first_not_of(" \t"); from != std::string_view::npos;) {
+      const std::string_view token = line.substr(from, line.find_first_of(" \t", from) - from);
+      const std::string lower = toLowerAscii(token);
+      const bool mayBeId = lower.ends_with("e-35") || lower.ends_with("e-035");
+      if (mayBeId && findById(token, withIds) != nullptr) return FoundIdValue{number, std::string(token)};
+      from = line.find_first_not_of(" \t", from + token.size());
+    }
+  }
+  return std::nullopt;
+}
 
 std::string ConvertIdTemplate(std::string_view templateName, std::string_view text,
                               std::span<const ModelParameter> parameters) {

@@ -42,6 +42,9 @@ class ParameterTemplate final {
   ParameterTemplate(std::string_view templateName, std::string_view text, std::span<const ModelParameter> parameters,
                     bool isConverted = false);
 
+  /// As given, for messages.
+  const std::string& name() const { return templateName_; }
+
   /// The parameter file's content for a full parameter vector. Every line ends in LF and has no trailing blanks.
   std::string fill(std::span<const double> modelValues) const;
 

@@ -8,6 +8,7 @@
 #include <gtest/gtest.h>
 
 #include "matchers.h"
+#include "parameters/template_doubts.h"
 #include "refusal.h"
 #include "temporary_folder.h"
 
@@ -153,6 +154,43 @@ TEST(ParameterTemplate, WarnsOfNarrowPlaceholders) {
   EXPECT_THAT(warnings("!K  !", with(dependent, 7, 7)), ElementsAre(HasSubstr("make it 10 wide")));
   EXPECT_THAT(warnings("!K           !", with(variable, 1e-120, 1)), ElementsAre(HasSubstr("no width is enough")));
   EXPECT_THAT(warnings("!K   !", with(variable, -100, 100)), ElementsAre(HasSubstr("make it 10 wide")));
+}
+
+TEST(TemplateDoubts, NameWhatIsReadInAnotherWayThanMeant) {
+  constexpr auto kNames = TemplateType::delimiter;
+  constexpr auto kIds = TemplateType::numericId;
+  const std::string same = "the parameter file is the same in every model run";
+  // the warnings, in order, by a part of each
+  const std::tuple<TemplateType, const char*, std::vector<std::string>> cases[] = {
+      {kNames, "$\nk $K   $\n", {}},
+      {kIds, "k 1e-35\n#\n50 % of K\n", {}},
+      {kNames, "$\nx 7e-35 1e-30\nk $K   $\n", {}},
+      {kNames,
+       "$ delimits\nk $K   $\n",
+       {"t:1: the first line holds the delimiter, \"$\", and does not reach the model: \"delimits\" behind it is "
+        "ignored"}},
+      {kNames, "k = !K  !\nx\n", {"\"= !K  !\" behind it is ignored; was a line for the delimiter forgotten?", same}},
+      {kNames, "$\nk $K   $\n x 1.5E-035 y", {"t:3: the ID value 1.5E-035 is no placeholder here: FileType = 1"}},
+      {kNames, "$\nk $K   $ #K2#\n", {"t:2: \"#K2#\" is copied as it is: the delimiter in the first line is $"}},
+      {kNames, "$\nplain\n", {"t: there is no placeholder in it: " + same}},
+      {kIds,
+       "$\nk $K   $\n",
+       {"t:2: \"$K   $\" is copied as it is: FileType = 0", "t: there is no ID value in it: " + same}},
+      {kIds, "k 1e-35\nm $Manning channel$\n", {"t:2: \"$Manning channel$\" is copied"}},
+  };
+  for (const auto& [type, text, expected] : cases) {
+    const std::string delimited = type == kIds ? ConvertIdTemplate("t", text, parameters()) : text;
+    const ParameterTemplate made("t", delimited, parameters(), type == kIds);
+    const std::vector<std::string> doubts = templateDoubts(made, type, text, parameters());
+    ASSERT_EQ(doubts.size(), expected.size()) << text;
+    for (std::size_t i = 0; i < doubts.size(); ++i) EXPECT_THAT(doubts[i], HasSubstr(expected[i]));
+  }
+  const auto hint = [](TemplateType type, const char* text) { return hintOnMisreadTemplate(type, text, parameters()); };
+  EXPECT_THAT(hint(kNames, "roughness 1\nK 2\nr"), HasSubstr("\"r\", the first character of the first line"));
+  EXPECT_THAT(hint(kNames, "1.0 2\nK 1.0"), HasSubstr("\"1\", the first character of the first line"));
+  EXPECT_THAT(hint(kNames, "1.0 2\nK 1e-35"), HasSubstr("line 2 has the ID value 1e-35: FileType = 1"));
+  EXPECT_THAT(hint(kIds, "!\n!K !"), HasSubstr("line 2 has \"!K !\": FileType = 0"));
+  EXPECT_EQ(hint(kNames, "!\n!k !"), "");
 }
 
 TEST(WriteParameterFile, RewritesAnExistingFileAndKeepsItsMode) {

@@ -1,0 +1,138 @@
+#include "parameters/template_doubts.h"
+
+#include <algorithm>
+
+#include <fmt/core.h>
+
+#include "common/take_text.h"
+#include "common/text.h"
+#include "common/utf8.h"
+#include "parameters/template_lines.h"
+
+namespace mirevo {
+namespace {
+
+constexpr std::string_view kLikelyDelimiters = "!$#%&@~^|*?";
+constexpr char kNoDelimiter = '\0';
+
+/// The text behind the delimiter in the first line of a template.
+std::string_view behindDelimiter(std::string_view text) {
+  std::string_view line = text.substr(0, text.find('\n'));
+  takeText(line, kByteOrderMark);
+  line = trim(line);
+  return line.empty() ? line : line.substr(1);
+}
+
+/// The name between two equal marks that begins at `at`, with the marks; empty if there is none.
+std::string_view markedNameAt(std::string_view line, std::size_t at, std::string_view name) {
+  if (at == 0 || kLikelyDelimiters.find(line[at - 1]) == std::string_view::npos) return {};
+  const std::size_t close = line.find_first_not_of(' ', at + name.size());
+  if (close == std::string_view::npos || line[close] != line[at - 1]) return {};
+  return line.substr(at - 1, close - at + 2);
+}
+
+/// The first one whose marks are not `delimiter`.
+std::string_view markedNameIn(std::string_view line, std::span<const ModelParameter> parameters, char delimiter) {
+  if (line.find_first_of(kLikelyDelimiters) == std::string_view::npos) return {};
+  for (const ModelParameter& parameter : parameters) {
+    const std::string_view name = trimBlanks(parameter.name);
+    if (name.empty()) continue;
+    for (std::size_t at = line.find(name); at != std::string_view::npos; at = line.find(name, at + 1)) {
+      const std::string_view marked = markedNameAt(line, at, name);
+      if (!marked.empty() && marked.front() != delimiter) return marked;
+    }
+  }
+  return {};
+}
+
+/// Whether a delimiter line may have been forgotten: the delimiter is the first character of a word or a number, or a
+/// placeholder with another one follows it.
+bool lacksDelimiterLine(std::string_view text, std::span<const ModelParameter> parameters) {
+  const std::string_view behind = behindDelimiter(text);
+  if (behind.empty()) return false;
+  const std::string first = toLowerAscii(std::string_view(behind.data() - 1, 1));
+  return (first >= "a" && first <= "z") || (first >= "0" && first <= "9") ||
+         !markedNameIn(text.substr(0, text.find('\n')), parameters, kNoDelimiter).empty();
+}
+
+/// A parameter's name between two equal characters that may be delimiters.
+struct FoundName {
+  std::size_t line = 0;  ///< from 1
+  std::string marked;    ///< "$Depth  $"
+};
+
+/// The first name whose marks are not `delimiter`, behind the delimiter line if there is one.
+std::optional<FoundName> findMarkedName(std::string_view text, std::span<const ModelParameter> parameters,
+                                        char delimiter = kNoDelimiter) {
+  std::size_t number = 0;
+  for (const std::string_view line : splitLines(text)) {
+    if (++number == 1 && delimiter != kNoDelimiter) continue;
+    if (const std::string_view marked = markedNameIn(line, parameters, delimiter); !marked.empty()) {
+      return FoundName{number, std::string(marked)};
+    }
+  }
+  return std::nullopt;
+}
+
+/// The delimiter of a delimiter template, which has one.
+char delimiterOf(std::string_view text) {
+  takeText(text, kByteOrderMark);
+  return trim(text).front();
+}
+
+}  // namespace
+
+std::vector<std::string> templateDoubts(const ParameterTemplate& parameterTemplate, TemplateType type,
+                                        std::string_view text, std::span<const ModelParameter> parameters) {
+  const std::string& name = parameterTemplate.name();
+  std::vector<std::string> doubts;
+  if (type == TemplateType::numericId) {
+    if (const auto found = findMarkedName(text, parameters)) {
+      doubts.push_back(
+          fmt::format("{}:{}: {} is copied as it is: FileType = 0 reads names between delimiters, 1 reads ID values",
+                      name, found->line, quotedForMessage(found->marked)));
+    }
+  } else {
+    if (const std::string_view behind = behindDelimiter(text); !behind.empty()) {
+      doubts.push_back(
+          fmt::format("{}:1: the first line holds the delimiter, {}, and does not reach the model: {} "
+                      "behind it is ignored{}",
+                      name, quotedForMessage(std::string_view(behind.data() - 1, 1)), quotedForMessage(trim(behind)),
+                      lacksDelimiterLine(text, parameters) ? "; was a line for the delimiter forgotten?" : ""));
+    }
+    const char delimiter = delimiterOf(text);
+    if (const auto found = findMarkedName(text, parameters, delimiter)) {
+      doubts.push_back(fmt::format("{}:{}: {} is copied as it is: the delimiter in the first line is {}", name,
+                                   found->line, quotedForMessage(found->marked), delimiter));
+    }
+    if (const auto found = findIdValue(text, parameters)) {
+      doubts.push_back(fmt::format(
+          "{}:{}: the ID value {} is no placeholder here: FileType = 1 reads ID values, any other names between "
+          "delimiters",
+          name, found->line, found->token));
+    }
+  }
+  if (parameterTemplate.parametersNamed().empty()) {
+    doubts.push_back(fmt::format("{}: there is no {} in it: the parameter file is the same in every model run", name,
+                                 type == TemplateType::numericId ? "ID value" : "placeholder"));
+  }
+  return doubts;
+}
+
+std::string hintOnMisreadTemplate(TemplateType type, std::string_view text,
+                                  std::span<const ModelParameter> parameters) {
+  if (type == TemplateType::numericId) {
+    const auto found = findMarkedName(text, parameters);
+    if (!found) return {};
+    return fmt::format("\nline {} has {}: FileType = 0 reads names between delimiters, 1 reads ID values", found->line,
+                       quotedForMessage(found->marked));
+  }
+  if (const auto found = findIdValue(text, parameters)) {
+    return fmt::format("\nline {} has the ID value {}: FileType = 1 reads ID values", found->line, found->token);
+  }
+  if (!lacksDelimiterLine(text, parameters)) return {};
+  return fmt::format("\nthe delimiter is {}, the first character of the first line: was a line for it forgotten?",
+                     quotedForMessage(std::string_view(behindDelimiter(text).data() - 1, 1)));
+}
+
+}  // namespace mirevo
