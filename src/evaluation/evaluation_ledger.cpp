@@ -12,7 +12,8 @@ void EvaluationLedger::begin(std::span<const ParameterSet> sets, DispatchMode mo
   isFinished_.assign(sets.size(), false);
   next_ = 0;
   finishedCount_ = 0;
-  if (earlier_ == nullptr || mode == DispatchMode::finalRun) return;
+  isFinalRun_ = mode == DispatchMode::finalRun;
+  if (earlier_ == nullptr || isFinalRun_) return;
   for (std::size_t place = 0; place < sets.size(); ++place) {
     if (auto result = earlier_->take(numberOf(place), sets[place])) replay(place, std::move(*result));
   }
@@ -78,6 +79,7 @@ void EvaluationLedger::warnOfUnusedObservations(const EvaluationResult& result) 
 }
 
 std::vector<EvaluationResult> EvaluationLedger::end() {
+  if (const auto text = equalMeasures_.findIn(sets_, results_, isFinalRun_)) observer_.warning(*text);
   evaluationCount_ += static_cast<int>(sets_.size());
   sets_ = {};
   isFinished_.clear();

@@ -5,10 +5,12 @@
 #include <optional>
 #include <span>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 #include "common/parameter_set.h"
 #include "evaluation/earlier_evaluations.h"
+#include "evaluation/equal_measures.h"
 #include "evaluation/evaluation_observer.h"
 #include "evaluation/evaluation_result.h"
 #include "evaluation/evaluator.h"
@@ -22,8 +24,9 @@ namespace mirevo {
 class EvaluationLedger final {
  public:
   /// `earlier`: evaluations that are not repeated; may be null.
-  EvaluationLedger(EvaluationObserver& observer, FailedRunPolicy& failedRuns, EarlierEvaluations* earlier = nullptr)
-      : observer_(observer), failedRuns_(failedRuns), earlier_(earlier) {}
+  EvaluationLedger(EvaluationObserver& observer, FailedRunPolicy& failedRuns, EarlierEvaluations* earlier = nullptr,
+                   EqualMeasures equalMeasures = {})
+      : observer_(observer), failedRuns_(failedRuns), earlier_(earlier), equalMeasures_(std::move(equalMeasures)) {}
 
   /// Opens the next batch of the run; `place` below is the 0-based index of a set in it. `sets` must outlive the batch.
   /// Sets that an earlier run has evaluated get their results at once, unless `mode` requires their model runs. Throws
@@ -44,7 +47,8 @@ class EvaluationLedger final {
     return !result.ok() && failedRuns_.isFolderWanted(*result.failure);
   }
   bool isComplete() const { return finishedCount_ == sets_.size(); }
-  /// Closes a complete batch and returns one result per set, in order.
+  /// Closes a complete batch and returns one result per set, in order. Warns if no model run so far depends on the
+  /// parameters.
   std::vector<EvaluationResult> end();
 
  private:
@@ -56,6 +60,8 @@ class EvaluationLedger final {
   EvaluationObserver& observer_;
   FailedRunPolicy& failedRuns_;
   EarlierEvaluations* earlier_;
+  EqualMeasures equalMeasures_;
+  bool isFinalRun_ = false;
   std::span<const ParameterSet> sets_;
   std::vector<EvaluationResult> results_;
   std::vector<bool> isFinished_;                   ///< whether a set has its result

@@ -159,6 +159,22 @@ std::vector<std::string> ModelRunner::readTemplates() {
   return converted;
 }
 
+EqualMeasures ModelRunner::equalMeasures() const {
+  std::vector<std::string> written;
+  for (const ParameterFileItem& item : description_.parameterFiles) written.push_back(item.paramFileName);
+  std::vector<std::string> names;
+  std::vector<std::string> read;
+  for (const OutputMeasure& measure : description_.measures) {
+    names.push_back(measure.name);
+    const bool isSeries = measure.interfaceType == InterfaceType::timeSeries;
+    read.push_back(isSeries ? measure.simulation.fileName : description_.measureFile);
+  }
+  for (std::vector<std::string>* const files : {&written, &read}) {
+    for (std::string& file : *files) file.erase(0, description_.baseFolder.size() + 1);
+  }
+  return {parameters_.searchSpace(), std::move(names), std::move(written), std::move(read)};
+}
+
 std::string ModelRunner::slotPath(const std::string& baseFile, int slot) const {
   return launcher_.getProcessFolder(slot) + std::string(trimTrailing(baseFile).substr(description_.baseFolder.size()));
 }

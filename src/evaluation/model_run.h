@@ -5,6 +5,7 @@
 #include <string>
 #include <vector>
 
+#include "evaluation/equal_measures.h"
 #include "evaluation/evaluation_result.h"
 #include "evaluation/saved_files.h"
 #include "evaluation/shown_runs.h"
@@ -75,6 +76,8 @@ class ModelRunner final {
   /// The observed series of each of shownMeasures().
   std::vector<PeriodSeries> readShownObservations();
   const std::vector<ParameterTemplate>& templates() const { return templates_; }
+  /// A check for a model that ignores its parameters, for the evaluations of a run.
+  EqualMeasures equalMeasures() const;
   /// templateDoubts() of all templates.
   const std::vector<std::string>& templateWarnings() const { return templateWarnings_; }
 

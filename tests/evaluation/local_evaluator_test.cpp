@@ -102,6 +102,48 @@ TEST_F(LocalEvaluatorTest, TheFailureAfterTheLimitEndsTheRunOnceItIsOnRecord) {
   }
 }
 
+TEST_F(LocalEvaluatorTest, AModelWhoseMeasuresNeverChangeIsToldOfOnce) {
+  const auto ignoresBelowThree = [](const std::string& folder) {
+    std::ifstream input(folder + "/parameters.txt");
+    std::string name, equals;
+    double a = 0.0;
+    input >> name >> equals >> a;
+    std::ofstream(folder + "/simulated.csv") << series(std::max(a, 3.0));
+  };
+  const std::vector<std::vector<double>> twentyOne = [] {
+    std::vector<std::vector<double>> singles;
+    for (int i = 0; i < 21; ++i) singles.push_back({0.1 * i});
+    return singles;
+  }();
+  // batches, of which the last is the final run; after how many of them the warning comes (0: never), and its beginning
+  const std::tuple<std::vector<std::vector<double>>, std::size_t, const char*> cases[] = {
+      {{{0, 1, 2}, {1, 0}, {0}}, 1, "All 3 successful"},
+      {{{0}, {1}, {0}}, 3, "All 3 successful"},
+      {{{9.5, 0}, {1, 2}, {0}}, 2, "All 3 successful"},
+      {twentyOne, 20, "All 20 successful"},
+      {{{0, 0}, {0, 0}, {0}}, 0, ""},
+      {{{0, 4}, {1, 2}, {0}}, 0, ""},
+  };
+  for (const auto& [batches, warnedAfter, text] : cases) {
+    FakeLauncher launcher([&](int start, const std::string&) {
+      return FakeLauncher::Batch{.seconds = start % 2 == 0 ? 1.0 : 3.0, .write = ignoresBelowThree};
+    });
+    LocalEvaluator& evaluator = makeEvaluator(launcher, 2, 100);
+    for (std::size_t i = 0; i < batches.size(); ++i) {
+      observer_.events.clear();
+      evaluate(evaluator, batches[i], i + 1 == batches.size() ? DispatchMode::finalRun : DispatchMode::task);
+      const bool isWarned = observer_.events.back().starts_with("warning: ");
+      EXPECT_EQ(isWarned, i + 1 == warnedAfter) << i << observer_.events.back();
+      if (!isWarned) continue;
+      EXPECT_EQ(observer_.events.back(),
+                fmt::format("warning: {} model runs so far have the same output measures, \"bias\" = 2, though their "
+                            "parameters differ: does the model read parameters.txt, and does it write simulated.csv "
+                            "anew?",
+                            text));
+    }
+  }
+}
+
 TEST_F(LocalEvaluatorTest, SetsThatCannotBeRunAreNotStarted) {
   FakeLauncher launcher([&](int, const std::string&) { return computes(1.0); });
   LocalEvaluator& evaluator = makeEvaluator(launcher, 1, 100);
