@@ -98,6 +98,10 @@ std::string convertLine(std::string_view templateName, std::size_t lineNumber, s
 
 }  // namespace
 
+bool isSameIdValue(double a, double b) {
+  return idKey(a) == idKey(b);
+}
+
 std::optional<FoundIdValue> findIdValue(std::string_view text, std::span<const ModelParameter> parameters) {
   std::vector<ModelParameter> withIds;
   std::copy_if(parameters.begin(), parameters.end(), std::back_inserter(withIds),

@@ -25,6 +25,9 @@ struct ParameterFileItem {
   std::string templateFileName;
 };
 
+/// Whether a numeric-ID template cannot tell two ID values from each other.
+bool isSameIdValue(double a, double b);
+
 /// Converts a numeric-ID template into a delimiter template, with its delimiter line. `templateName` is used in
 /// messages. Throws FatalError for an ID value that no parameter has, for a token that ends like an ID value but is not
 /// a number, and for a line that is too long.

@@ -178,7 +178,8 @@ void RunDriver::logSetup() {
   state_.log.line("");
   state_.log.line(setupSummary(config_, parameters_->searchSpace(), parameters_->evaluationOrder()));
   for (const std::string& text : runner_->templateWarnings()) state_.log.warning(text);
-  for (const std::string& text : unusedParameterWarnings(config_.parameters, runner_->templates())) {
+  for (const std::string& text :
+       unusedParameterWarnings(config_.parameters, config_.constraints, runner_->templates())) {
     state_.log.warning(text);
   }
   for (const ParameterTemplate& parameterTemplate : runner_->templates()) {

@@ -55,6 +55,7 @@ TEST_F(Mpi, AJobWritesTheResultsOfAPlainRun) {
        3},
   };
   folder_.useScript(fmt::format("{}\n{}", kSleepByParameters, kCountsJobVariables));
+  std::filesystem::create_directory(folder_ / "scratch");  // a plain run would warn that it is missing
   for (auto [settings, processes] : cases) {
     const std::string setup = folder_.writeSetup(settings);
     const ProgramResult alone = runProgram({setup});

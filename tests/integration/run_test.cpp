@@ -62,17 +62,17 @@ TEST(Optimisation, OfEqualSetsTheResultsNameTheOneThatTheSearchTookAndUnusedPara
   EXPECT_EQ(rows[10][2], rows[9][2]);
   const std::string log = folder.read("basin.log");
   for (const char* name : {"a", "b"}) {
-    EXPECT_THAT(log, HasSubstr(fmt::format("Warning: the variable parameter \"{}\" stands in no template", name)));
+    EXPECT_THAT(log, HasSubstr(fmt::format("Warning: the variable parameter \"{}\" is in no template", name)));
   }
-  EXPECT_THAT(log, Not(HasSubstr("parameter \"c\" stands in no template"))) << "a fixed one";
+  EXPECT_THAT(log, Not(HasSubstr("parameter \"c\" is in no template"))) << "a fixed one";
   EXPECT_THAT(log, HasSubstr("parameters.tpl:4: the placeholder of parameter \"c\""));
   // Whoever does not read the log is told, too.
-  const std::string first = "the variable parameter \"a\" stands in no template: its value does not reach the model";
+  const std::string first = "the variable parameter \"a\" is in no template: its value does not reach the model";
   const std::string report = folder.read("basin_Report.html");
-  EXPECT_EQ(run.error, fmt::format("Mirevo: 3 warnings in {}; the first: {}\n", folder / "basin.log", first));
+  EXPECT_EQ(run.error, fmt::format("Mirevo: 4 warnings in {}; the first: {}\n", folder / "basin.log", first));
   EXPECT_THAT(folder.read("basin._spi_"), HasSubstr("\nMESSAGWarning: " + first + "\n"));
-  EXPECT_THAT(report, HasSubstr("Warning: the variable parameter \\\"a\\\" stands in no template"));
-  EXPECT_THAT(log, HasSubstr("\n3 warnings: the lines above that begin with"));
+  EXPECT_THAT(report, HasSubstr("Warning: the variable parameter \\\"a\\\" is in no template"));
+  EXPECT_THAT(log, HasSubstr("\n4 warnings: the lines above that begin with"));
 }
 
 TEST(Scenarios, ASetupThatSelectsNothingSaysSo) {

@@ -100,6 +100,7 @@ struct KeywordRow {
   void (*store)(void* settings, const SetupValue& value) = nullptr;
   /// Checks the value against the others of its section; called if it is within its own range.
   std::optional<SettingRefusal> (*check)(const void* settings) = nullptr;
+  bool isYesOrNo = false;  ///< any number is valid, of which the lowest bit counts
 
   std::string_view name() const { return facts.name; }
   bool isRequired() const { return facts.defaultValue.empty(); }
@@ -172,9 +173,13 @@ KeywordRow setting(FieldOf, KeywordFacts facts) {
   const KeywordType type = facts.type.value_or(
       std::is_same_v<Field, bool> || !facts.codes.empty() ? KeywordType::code : settings_detail::typeOf<Field>());
   if (std::is_same_v<Field, bool> && facts.codes.empty()) facts.codes = kNoYesNames;
-  return {std::move(facts), type, [](void* settings, const SetupValue& value) {
-            settings_detail::assign(FieldOf{}(*static_cast<Settings*>(settings)), value);
-          }};
+  return {.facts = std::move(facts),
+          .type = type,
+          .store =
+              [](void* settings, const SetupValue& value) {
+                settings_detail::assign(FieldOf{}(*static_cast<Settings*>(settings)), value);
+              },
+          .isYesOrNo = std::is_same_v<Field, bool>};
 }
 
 /// The same for a field named by its member pointer: `setting<&SceSettings::complexCount>({...})`.

@@ -78,6 +78,16 @@ std::string SetupFile::relative(const std::string& path) const {
 SetupSection::SetupSection(SetupFile& file, const KdxSection& node, std::string path, std::string pattern)
     : file_(&file), node_(&node), path_(std::move(path)), pattern_(std::move(pattern)) {}
 
+bool SetupSection::holds(std::string_view path) const {
+  const KdxSection* node = node_;
+  for (std::size_t from = 0; node != nullptr && from <= path.size();) {
+    const std::size_t end = std::min(path.find('/', from), path.size());
+    node = node->section(path.substr(from, end - from));
+    from = end + 1;
+  }
+  return node != nullptr;
+}
+
 std::optional<SetupSection> SetupSection::openIfPresent(std::string_view name) const {
   const KdxSection* node = node_->section(name);
   if (node == nullptr) return std::nullopt;
@@ -126,7 +136,14 @@ void SetupSection::takeRow(const KeywordRow& row, void* settings) const {
   const bool isList = row.type == KeywordType::textLines;
   const int count = isList ? node_->keywordCount(row.name()) : std::min(1, node_->keywordCount(row.name()));
   for (int instance = 1; instance <= count; ++instance) {
-    takeValue(row, convert(row, *node_->keyword(row.name(), instance)), false, settings);
+    const SetupValue value = convert(row, *node_->keyword(row.name(), instance));
+    takeValue(row, value, false, settings);
+    const auto* number = std::get_if<std::int32_t>(&value);
+    if (row.isYesOrNo && number != nullptr && *number != 0 && *number != 1) {
+      const auto read = std::size_t(*number & 1);
+      warn(row.name(),
+           fmt::format("found {}, expected 0 or 1; read as {} ({})", *number, read, kNoYesNames[read].name));
+    }
   }
   if (count > 0) return;
   if (row.isRequired()) refuseMissing(row);

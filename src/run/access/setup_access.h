@@ -66,6 +66,8 @@ class SetupSection final {
   /// Opens a section inside this one and echoes its name. Throws FatalError with "Error: Unable to open section ...".
   SetupSection open(std::string_view name) const;
   std::optional<SetupSection> openIfPresent(std::string_view name) const;
+  /// Whether there is a section with this path, names with `/` between them, in this one; echoes nothing.
+  bool holds(std::string_view path) const;
   /// `PARAMETER_12` for the prefix `PARAMETER_`.
   SetupSection openItem(std::string_view prefix, std::size_t number) const;
 

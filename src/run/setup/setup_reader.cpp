@@ -13,6 +13,7 @@
 #include "run/access/file_validation.h"
 #include "run/setup/model_keywords.h"
 #include "run/setup/run_keywords.h"
+#include "run/setup/setting_doubts.h"
 #include "run/setup/setup_warnings.h"
 #include "run/setup/validation.h"
 
@@ -50,6 +51,9 @@ class SetupReader final {
     }
     readSimultaneousSimulations();
     readMeasureFile();
+    sections_.parameters = std::move(parameterSections_);
+    sections_.objectives = std::move(objectiveSections_);
+    warnOfDoubtfulSettings(config_, sections_);
     config_.resultSettings = std::move(file_.resultSettings());
     return std::move(config_);
   }
@@ -74,6 +78,7 @@ class SetupReader final {
   RunConfig config_;
   std::vector<SetupSection> parameterSections_;
   std::vector<SetupSection> objectiveSections_;
+  SectionsRead sections_;  ///< without those two
 };
 
 void SetupReader::readSimulationOption() {
@@ -84,9 +89,12 @@ void SetupReader::readSimulationOption() {
       .readItems("SIMBATCHITEM_", batchItemSection(), config_.batchItems, "Error: No model simulation sequence defined",
                  [this](const SetupSection& opened, const BatchItem& item) { checkBatchItem(opened, item); });
   section.open("SIMPARAM")
-      .readItems(
-          "SIMPARAMITEM_", parameterFileSection(), config_.parameterFiles, "Error: No model parameter files defined",
-          [this](const SetupSection& opened, const ParameterFileItem& item) { checkParameterFile(opened, item); });
+      .readItems("SIMPARAMITEM_", parameterFileSection(), config_.parameterFiles,
+                 "Error: No model parameter files defined",
+                 [this](const SetupSection& opened, const ParameterFileItem& item) {
+                   checkParameterFile(opened, item);
+                   sections_.parameterFiles.push_back(opened);
+                 });
 }
 
 void SetupReader::checkBatchItem(const SetupSection& section, const BatchItem& item) {
@@ -178,6 +186,7 @@ void SetupReader::readInternalConstraints() {
 void SetupReader::readObjectiveFunctions() {
   const SetupSection section = target_.open("ObjectiveFunctions");
   section.read(judgementSection(), config_);
+  sections_.judgement = section;
 
   std::vector<SetupSection> measureSections;
   section.open("OUTPUT_MEASURES")
@@ -195,6 +204,7 @@ void SetupReader::readObjectiveFunctions() {
             return ObjectiveSection{function, names};
           });
   connectMeasures(measureSections);
+  sections_.measures = std::move(measureSections);
   if (!config_.task || !config_.task->mayHaveInitialSample()) requireScales(false);
 }
 
@@ -274,6 +284,7 @@ void SetupReader::readSavedFiles() {
 void SetupReader::readSimultaneousSimulations() {
   const SetupSection section = target_.open("SimultaneousSimulations");
   section.read(slotsSection(), config_);
+  sections_.slots = section;
   if (config_.usesMpiWorkers) {
     if (config_.simultaneousSimulations > 1) section.note(kSlotsKeyword, "taken as 1 on each worker of the MPI job");
     config_.simultaneousSimulations = 1;

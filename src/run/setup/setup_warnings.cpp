@@ -10,6 +10,7 @@ namespace {
 
 /// Limits the log if, for instance, every line of a file gives a warning.
 constexpr int kMostWarnings = 50;
+constexpr std::string_view kUnusedTimeKeyword = "MaxSimTime";
 
 class EntryCheck final {
  public:
@@ -48,6 +49,10 @@ class EntryCheck final {
       warn(keyword.position, "keyword", keyword.name, nearestName(keyword.name, known));
     } else if (row->type != KeywordType::textLines && node.keyword(keyword.name) != &keyword) {
       warnRepeated(keyword.position, "keyword", keyword.name, node.keyword(keyword.name)->position);
+    } else if (keyword.name == kUnusedTimeKeyword) {
+      report(keyword.position, fmt::format("keyword {} is not used; MaxSimulationTime in [SimultaneousSimulations] "
+                                           "limits the time of a model run",
+                                           quotedForMessage(keyword.name)));
     }
   }
 
@@ -86,30 +91,40 @@ void warnAboutUnusedEntries(SetupFile& file) {
 }
 
 std::vector<std::string> unusedParameterWarnings(std::span<const ModelParameter> parameters,
+                                                 std::span<const InternalConstraint> constraints,
                                                  std::span<const ParameterTemplate> templates) {
-  std::vector<std::size_t> toFollow;
-  for (const ParameterTemplate& parameterTemplate : templates) {
-    for (const std::size_t index : parameterTemplate.parametersNamed()) toFollow.push_back(index);
-  }
   std::vector<std::string> names;
   for (const ModelParameter& parameter : parameters) names.push_back(parameter.name);
   std::vector<double> values(parameters.size());
   const ExpressionEvaluator equations(names, values);
   std::vector<bool> isUsed(parameters.size());
-  while (!toFollow.empty()) {
-    const std::size_t index = toFollow.back();
-    toFollow.pop_back();
-    if (isUsed[index]) continue;
-    isUsed[index] = true;
-    if (parameters[index].parameterType != ParameterType::dependent) continue;
-    const auto equation = equations.compile(parameters[index].equation);
-    toFollow.insert(toFollow.end(), equation->variables().begin(), equation->variables().end());
+  /// Marks the parameters and those from which they are computed.
+  const auto follow = [&](std::vector<std::size_t> toFollow) {
+    while (!toFollow.empty()) {
+      const std::size_t index = toFollow.back();
+      toFollow.pop_back();
+      if (isUsed[index]) continue;
+      isUsed[index] = true;
+      if (parameters[index].parameterType != ParameterType::dependent) continue;
+      const auto equation = equations.compile(parameters[index].equation);
+      toFollow.insert(toFollow.end(), equation->variables().begin(), equation->variables().end());
+    }
+  };
+  for (const ParameterTemplate& parameterTemplate : templates) follow(parameterTemplate.parametersNamed());
+  const std::vector<bool> reachesModel = isUsed;
+  for (const InternalConstraint& constraint : constraints) {
+    for (const std::string& side : {constraint.leftEquation, constraint.rightEquation}) {
+      const auto equation = equations.compile(side);
+      follow({equation->variables().begin(), equation->variables().end()});
+    }
   }
   std::vector<std::string> warnings;
   for (std::size_t i = 0; i < parameters.size(); ++i) {
-    if (isUsed[i] || parameters[i].parameterType != ParameterType::variable) continue;
+    const bool isVariable = parameters[i].parameterType == ParameterType::variable;
+    if (isVariable ? reachesModel[i] : isUsed[i]) continue;
     warnings.push_back(
-        fmt::format("the variable parameter {} stands in no template: its value does not reach the model",
+        fmt::format("the {} parameter {} is in no template: its value does not reach the model",
+                    nameOfCode(kParameterTypeNames, static_cast<std::int32_t>(parameters[i].parameterType)),
                     quotedForMessage(parameters[i].name)));
   }
   return warnings;

@@ -99,6 +99,9 @@ void OptimisationTask::read(const TaskReading& reading) {
   sample.read(initialSampleSection(), filled);
   if (initialSample.generation == SampleGeneration::fromFile) {
     validateFileOpens(initialSample.fileName, kInitialSampleFileKeyword, sample);
+  } else if (!initialSample.fileName.empty()) {
+    sample.warn(kInitialSampleFileKeyword, fmt::format("not read, as Initial_Sample_Generation is {} and not 4",
+                                                       static_cast<int>(initialSample.generation)));
   }
   reading.requireScales(method->evaluatesSample(initialSample));
 

@@ -65,6 +65,19 @@ void validateScenarioRun(std::span<const double> values, std::span<const ModelPa
   }
 }
 
+/// Warns once of each fixed parameter for which a run has another value; `told` says of which already.
+void warnOfFixedParameters(std::span<const double> values, std::span<const ModelParameter> parameters,
+                           const SetupSection& section, std::vector<bool>& told) {
+  for (std::size_t i = 0; i < values.size(); ++i) {
+    const ModelParameter& parameter = parameters[i];
+    if (parameter.parameterType != ParameterType::fixed || values[i] == parameter.initialValue || told[i]) continue;
+    told[i] = true;
+    section.warn(kValuesKeyword,
+                 fmt::format("value {}, {}, is not used: parameter {} is fixed at {}", i + 1, formatReal(values[i]),
+                             quotedForMessage(parameter.name), formatReal(parameter.initialValue)));
+  }
+}
+
 }  // namespace
 
 const TaskFacts& ScenarioTask::facts() const {
@@ -79,11 +92,18 @@ std::vector<const SectionRow*> ScenarioTask::sections() const {
 void ScenarioTask::read(const TaskReading& reading) {
   const SetupSection section = reading.target.open("SCENARIOS");
   section.read(scenarioSection(), settings);
-  if (settings.type == ScenarioType::singleRun) return;
+  if (settings.type == ScenarioType::singleRun) {
+    if (section.holds("SCENARIO_RUNS/SCENARIO_1")) {
+      section.warn("Scenario_Type", "0 makes a single run with the initial values, SCENARIO_RUNS is not read");
+    }
+    return;
+  }
+  std::vector<bool> told(reading.parameters.size());
   section.open("SCENARIO_RUNS")
       .readItems("SCENARIO_", runSection(), settings.runs, "Error: No scenario runs defined",
-                 [&reading](const SetupSection& item, const ScenarioRun& run) {
+                 [&reading, &told](const SetupSection& item, const ScenarioRun& run) {
                    validateScenarioRun(run.values, reading.parameters, item);
+                   warnOfFixedParameters(run.values, reading.parameters, item, told);
                  });
 }
 

@@ -132,7 +132,7 @@ TEST_F(SetupReaderTest, EchoesEverySectionAndValueInReadingOrder) {
   EXPECT_THAT(log, HasSubstr("  Start_Date = 2001-01-31 00:00\n  End_Date = 2003-12-31 24:00\n"));
 }
 
-TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatEndASearchEarly) {
+TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatAreSeldomMeant) {
   // warning: none where it is empty
   const std::pair<const char*, const char*> cases[] = {
       {"Weight_Above = 2.5 => Weigth_Abov = 2.5",
@@ -151,6 +151,71 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatEndASearchEarly
       {"[/MIREVO_PARAMETERS] => [/MIREVO_PARAMETERS][MIREVO_PARAMETERS][/MIREVO_PARAMETERS]",
        "a second [MIREVO_PARAMETERS] is not read"},
       {"[SCENARIOS] => [TMEMPARAM]\nTmemOption = 1\n[/TMEMPARAM][SCENARIOS]", ""},
+      {"[SCENARIOS] => [TMEMPARAM]\nMaxSimTime = 60.0\n[/TMEMPARAM][SCENARIOS]",
+       "setup.kdx:104:1: keyword \"MaxSimTime\" is not used; MaxSimulationTime in [SimultaneousSimulations] limits the "
+       "time of a model run"},
+      // Settings that are certain not to yield what is wanted.
+      {"Function_Type = 2\n        Weight = 0.75 => Function_Type = 2\n        Weight = 0.0",
+       "setup.kdx:93:18: Weight: the weights of all objective functions are 0, and so is every aggregate"},
+      {"Weight = 1.25 => 0 & Weight_Above = 2.5 => 0",
+       "setup.kdx:67:18: Weight: both weights are 0, the measure does not depend on the model"},
+      {"Weight_Above = 2.5 => 0", ""},
+      {"File_Name = 'gauge.csv' => File_Name = 'model/flow.csv'",
+       "setup.kdx:64:16: Name: the observed series is in the file of the simulated one, which the model writes"},
+      {"Aggregation_Method = 0 => 3",
+       "setup.kdx:60:26: Aggregation_Method: makes every aggregate 0: the search cannot tell one set from another"},
+      {"Aggregation_Method = 0 => 3 & Option = 2 => 0 & NoSimultaneousSim = 4 => 1", ""},
+      {"Statistic_Type = 1 => 0 & Function_Type = 2 => 0",
+       "setup.kdx:92:25: Function_Type: a sum with a difference that may be negative (\"Flow error\") is the smaller "
+       "the "
+       "further the simulation is below the observation, and the search looks for the smallest: absolute values or "
+       "squares are meant for differences"},
+      {"Statistic_Type = 1 => 4 & Function_Type = 2 => 0", "Function_Type: a sum with a difference"},
+      {"Statistic_Type = 1 => 0", ""},
+      {"Function_Type = 2 => 0", ""},
+      {"Statistic_Type = 1 => 0 & Function_Type = 2 => 0 & Weight = 1.25 => 0", ""},
+      {"Statistic_Type = 1 => 0 & Function_Type = 2 => 0 & Option = 2 => 0 & NoSimultaneousSim = 4 => 1", ""},
+      {"Algorithm_Type = 1 => 2 & Use_Surrogate_Model = 1 => 0 & Initial_Value = 412.5 => 100 & Upper_Bound = 900 => "
+       "100 & "
+       "Initial_Value = 0.31D0 => 0 & Upper_Bound = 1.0 => 0 & NoSimultaneousSim = 4 => 1",
+       "setup.kdx:28:21: Upper_Bound: the bounds leave one value to every variable parameter: all sets of the search "
+       "are the same"},
+      {"Algorithm_Type = 1 => 2 & Use_Surrogate_Model = 1 => 0 & Initial_Value = 412.5 => 100 & Upper_Bound = 900 => "
+       "100 & "
+       "NoSimultaneousSim = 4 => 1",
+       ""},
+      {"TqSEKdxListItemCount = 1 // files => TqSEKdxListItemCount = 2\n[SIMPARAMITEM_2]\nParamFileName = "
+       "'model/soil.par'\nTemplateFileName = 'model/soil.tpl'\n[/SIMPARAMITEM_2]",
+       "setup.kdx:14:17: ParamFileName: SIMPARAMITEM_1 writes this file, too; the model gets what is written last, "
+       "from "
+       "this item"},
+      {"Parameter_Name = 'Rate' => Parameter_Name = 'Rate'\nParameter_Equation = 'Depth * 2'",
+       "setup.kdx:38:22: Parameter_Equation: not used, as only Parameter_Type = 2 makes a parameter dependent"},
+      {"ParamFileName => FileType = 1\nParamFileName & Parameter_Name = 'Rate' => Parameter_Name = "
+       "'Rate'\nParameter_IDValue = 1.5004E-35",
+       "setup.kdx:46:27: Parameter_IDValue: taken for that of parameter \"Rate\", 1.5004e-35: ID values must differ by "
+       "1e-37 or more"},
+      {"Parameter_Name = 'Rate' => Parameter_Name = 'Rate'\nParameter_IDValue = 1.5004E-35", ""},
+      {"Initial_Value = 0.31D0 => 1.25 & Lower_Bound = 0.0 => 0.5 & Upper_Bound = 1.0 => Upper_Bound = "
+       "3.5\nTransformation_Type = 2",
+       "setup.kdx:34:23: Initial_Value: 1.25 is not a whole number of steps above Lower_Bound = 0.5, 0.5 is taken"},
+      {"Initial_Value = 0.31D0 => 1.5 & Lower_Bound = 0.0 => 0.5 & Upper_Bound = 1.0 => Upper_Bound = "
+       "3\nTransformation_Type = 2",
+       "setup.kdx:36:21: Upper_Bound: 3 is not a whole number of steps above Lower_Bound = 0.5, 2.5 is taken"},
+      {"Initial_Sample_Generation = 4 => 1",
+       "Initial_Sample_File_Name: not read, as Initial_Sample_Generation is 1 and not 4"},
+      {"Include_Initial_Parameters = 1 => 2", "Include_Initial_Parameters: found 2, expected 0 or 1; read as 0 (no)"},
+      {"Include_Initial_Parameters = 1 => -1", "found -1, expected 0 or 1; read as 1 (yes)"},
+      {"Option = 2 => 0 & Scenario_Type = 1 => 0 & NoSimultaneousSim = 4 => 1",
+       "setup.kdx:104:21: Scenario_Type: 0 makes a single run with the initial values, SCENARIO_RUNS is not read"},
+      {"Option = 2 => 0 & Parameter_Name = 'Rate' => Parameter_Name = 'Rate'\nParameter_Type = 1 & "
+       "NoSimultaneousSim = 4 => 1",
+       "Parameters: value 2, 1, is not used: parameter \"Rate\" is fixed at 0.31"},
+      {"NoSimultaneousSim = 4 => NoSimultaneousSim = 4\nProcessFolder = 'model/runs'",
+       "ProcessFolder: is in the base folder model, of which every process folder is a copy"},
+      {"NoSimultaneousSim = 4 => NoSimultaneousSim = 4\nProcessFolder = 'scrach/me'",
+       "ProcessFolder: scrach does not exist and is made: is the name right?"},
+      {"NoSimultaneousSim = 4 => NoSimultaneousSim = 4\nProcessFolder = 'runs'", ""},
       // Settings that end a search early.
       {"", ""},  // two variable parameters, 20 = 4(2n + 1) points
       {"Population_Size = 20 => 19 & Neighbourhood_Size = 60 => 50",

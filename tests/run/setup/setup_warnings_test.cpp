@@ -20,8 +20,20 @@ TEST(UnusedParameterWarnings, FollowDependentParametersFromTheTemplatesOn) {
   add("second", ParameterType::dependent, "first + fixed");
   add("nowhere", ParameterType::dependent, "lost + 1");
   const std::vector<ParameterTemplate> templates(1, ParameterTemplate("t", "!\n!direct! !second!", parameters));
-  EXPECT_THAT(unusedParameterWarnings(parameters, templates),
-              ElementsAre(StartsWith("the variable parameter \"lost\" stands in no template")));
+  add("limit", ParameterType::fixed);
+  add("share", ParameterType::dependent, "reserve / 2");
+  add("reserve", ParameterType::fixed);
+  const auto isUnused = [](const char* parameter) {
+    return StartsWith(std::string("the ") + parameter + " is in no template");
+  };
+  std::vector<InternalConstraint> constraints{{"lost", "limit + share", LogicalOperator::less}};
+  EXPECT_THAT(unusedParameterWarnings(parameters, constraints, templates),
+              ElementsAre(isUnused("variable parameter \"lost\""), isUnused("dependent parameter \"nowhere\"")));
+  constraints.clear();
+  EXPECT_THAT(unusedParameterWarnings(parameters, constraints, templates),
+              ElementsAre(isUnused("variable parameter \"lost\""), isUnused("dependent parameter \"nowhere\""),
+                          isUnused("fixed parameter \"limit\""), isUnused("dependent parameter \"share\""),
+                          isUnused("fixed parameter \"reserve\"")));
 }
 
 }  // namespace

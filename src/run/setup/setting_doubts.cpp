@@ -1,0 +1,175 @@
+#include "run/setup/setting_doubts.h"
+
+#include <algorithm>
+#include <cmath>
+#include <cstddef>
+#include <filesystem>
+
+#include <fmt/core.h>
+
+#include "common/paths.h"
+#include "common/text.h"
+#include "measures/statistics.h"
+#include "parameters/search_space.h"
+
+namespace mirevo {
+namespace {
+
+/// Whether two names are of one file, links followed where it exists.
+bool isSameFile(const std::string& a, const std::string& b) {
+  std::error_code ignored;
+  return a == b || std::filesystem::equivalent(a, b, ignored);
+}
+
+void warnOfParameterFiles(const RunConfig& config, const SectionsRead& sections) {
+  for (std::size_t i = 0; i < config.parameterFiles.size(); ++i) {
+    for (std::size_t earlier = 0; earlier < i; ++earlier) {
+      if (!isSameFile(config.parameterFiles[i].paramFileName, config.parameterFiles[earlier].paramFileName)) continue;
+      sections.parameterFiles[i].warn(
+          "ParamFileName", fmt::format("{} writes this file, too; the model gets what is written last, from this item",
+                                       sections.parameterFiles[earlier].name()));
+      break;
+    }
+  }
+}
+
+void warnOfIdValues(const RunConfig& config, const SectionsRead& sections) {
+  const bool areUsed =
+      std::any_of(config.parameterFiles.begin(), config.parameterFiles.end(),
+                  [](const ParameterFileItem& item) { return item.templateType == TemplateType::numericId; });
+  if (!areUsed) return;
+  for (std::size_t i = 0; i < config.parameters.size(); ++i) {
+    const ModelParameter& parameter = config.parameters[i];
+    const auto earlier = std::find_if(config.parameters.begin(), config.parameters.begin() + std::ptrdiff_t(i),
+                                      [&parameter](const ModelParameter& other) {
+                                        return other.idValue != 0.0 && isSameIdValue(other.idValue, parameter.idValue);
+                                      });
+    if (parameter.idValue == 0.0 || earlier == config.parameters.begin() + std::ptrdiff_t(i)) continue;
+    sections.parameters[i].warn(
+        "Parameter_IDValue", fmt::format("taken for that of parameter {}, {}: ID values must differ by 1e-37 or more",
+                                         quotedForMessage(earlier->name), formatReal(earlier->idValue)));
+  }
+}
+
+/// The value on the grid of an integer parameter; logarithms are not taken here.
+double onGrid(const ModelParameter& parameter, double value) {
+  bool failed = false;
+  return TransformParameterValue(value, parameter.lowerBound, TransformationType::integer, TransformDirection::forward,
+                                 failed);
+}
+
+void warnOffGrid(const ModelParameter& parameter, double value, std::string_view keyword, const SetupSection& section) {
+  constexpr double kRounding = 1.0e-6;
+  const double taken = onGrid(parameter, value);
+  if (std::abs(taken - value) <= kRounding) return;
+  section.warn(keyword, fmt::format("{} is not a whole number of steps above Lower_Bound = {}, {} is taken",
+                                    formatReal(value), formatReal(parameter.lowerBound), formatReal(taken)));
+}
+
+void warnOfParameters(const RunConfig& config, const SectionsRead& sections) {
+  for (std::size_t i = 0; i < config.parameters.size(); ++i) {
+    const ModelParameter& parameter = config.parameters[i];
+    if (parameter.parameterType != ParameterType::dependent && !trim(parameter.equation).empty()) {
+      sections.parameters[i].warn("Parameter_Equation",
+                                  "not used, as only Parameter_Type = 2 makes a parameter dependent");
+    }
+    if (parameter.parameterType != ParameterType::variable ||
+        parameter.transformationType != TransformationType::integer) {
+      continue;
+    }
+    warnOffGrid(parameter, parameter.initialValue, "Initial_Value", sections.parameters[i]);
+    warnOffGrid(parameter, parameter.upperBound, "Upper_Bound", sections.parameters[i]);
+  }
+}
+
+bool hasOneValue(const ModelParameter& parameter) {
+  if (parameter.parameterType != ParameterType::variable) return true;
+  const bool isInteger = parameter.transformationType == TransformationType::integer;
+  return (isInteger ? onGrid(parameter, parameter.upperBound) : parameter.upperBound) <= parameter.lowerBound;
+}
+
+void warnOfMeasures(const RunConfig& config, const SectionsRead& sections) {
+  for (std::size_t i = 0; i < config.measures.size(); ++i) {
+    const OutputMeasure& measure = config.measures[i];
+    if (measure.interfaceType != InterfaceType::timeSeries) continue;
+    if (measure.weight == 0.0 && measure.weightAbove == 0.0) {
+      sections.measures[i].warn("Weight", "both weights are 0, the measure does not depend on the model");
+    }
+    if (isSameFile(measure.simulation.fileName, measure.observation.fileName)) {
+      sections.measures[i].warn("Name",
+                                "the observed series is in the file of the simulated one, which the model writes");
+    }
+  }
+}
+
+/// Whether the value of an objective function becomes ever better the further a measure is below 0.
+bool rewardsTooLittle(const RunConfig& config, const ObjectiveFunction& objective, const OutputMeasure& measure) {
+  if (config.aggregationMethod == AggregationMethod::zero || objective.functionType != FunctionType::sum ||
+      !(objective.weight > 0.0) || measure.interfaceType != InterfaceType::timeSeries) {
+    return false;
+  }
+  const Statistic& statistic = statisticOf(measure.statisticType);
+  return statistic.best == Best::zero && statistic.inObjective(-1.0) < 0.0 && measure.weight > 0.0;
+}
+
+/// What makes a search pointless.
+void warnOfSearch(const RunConfig& config, const SectionsRead& sections) {
+  if (config.aggregationMethod == AggregationMethod::zero) {
+    sections.judgement->warn("Aggregation_Method",
+                             "makes every aggregate 0: the search cannot tell one set from another");
+  }
+  for (std::size_t i = 0; i < config.objectives.size(); ++i) {
+    for (const std::size_t measure : config.objectives[i].measures) {
+      if (!rewardsTooLittle(config, config.objectives[i], config.measures[measure])) continue;
+      sections.objectives[i].warn(
+          "Function_Type",
+          fmt::format("a sum with a difference that may be negative ({}) is the smaller the further the simulation is "
+                      "below the observation, and the search looks for the smallest: absolute values or squares are "
+                      "meant for differences",
+                      quotedForMessage(config.measures[measure].name)));
+      break;
+    }
+  }
+  if (std::all_of(config.parameters.begin(), config.parameters.end(), hasOneValue)) {
+    const auto variable = std::find_if(
+        config.parameters.begin(), config.parameters.end(),
+        [](const ModelParameter& parameter) { return parameter.parameterType == ParameterType::variable; });
+    sections.parameters[static_cast<std::size_t>(variable - config.parameters.begin())].warn(
+        "Upper_Bound", "the bounds leave one value to every variable parameter: all sets of the search are the same");
+  }
+}
+
+void warnOfObjectives(const RunConfig& config, const SectionsRead& sections) {
+  const bool isWeighted = std::any_of(config.objectives.begin(), config.objectives.end(),
+                                      [](const ObjectiveFunction& objective) { return objective.weight != 0.0; });
+  if (isWeighted || config.objectives.empty()) return;
+  sections.objectives.front().warn("Weight", "the weights of all objective functions are 0, and so is every aggregate");
+}
+
+void warnOfProcessFolder(const RunConfig& config, const SectionsRead& sections) {
+  if (config.processFolder.empty()) return;
+  constexpr std::string_view kKeyword = "ProcessFolder";
+  if (pathInFolder(config.processFolder, config.baseFolder)) {
+    sections.slots->warn(
+        kKeyword, fmt::format("is in the base folder {}, of which every process folder is a copy", config.baseFolder));
+  }
+  if (config.usesMpiWorkers) return;  // it may be on a disk that only the workers have
+  std::error_code ignored;
+  const std::filesystem::path parent = std::filesystem::path(config.processFolder).parent_path();
+  if (std::filesystem::exists(parent, ignored)) return;
+  sections.slots->warn(kKeyword, fmt::format("{} does not exist and is made: is the name right?", parent.string()));
+}
+
+}  // namespace
+
+void warnOfDoubtfulSettings(const RunConfig& config, const SectionsRead& sections) {
+  warnOfParameterFiles(config, sections);
+  warnOfIdValues(config, sections);
+  warnOfParameters(config, sections);
+  warnOfMeasures(config, sections);
+  warnOfObjectives(config, sections);
+  if (config.task && config.task->hasFinalRun()) warnOfSearch(config, sections);
+  warnOfProcessFolder(config, sections);
+}
+
+}  // namespace mirevo
