@@ -15,19 +15,18 @@
 #include "parameters/template_lines.h"
 
 namespace mirevo {
-namespace {
 
-/// A placeholder's name is padded to this length, so that every value has at least 11 characters.
-constexpr std::size_t kMinimumNameLength = 9;
-constexpr std::size_t kMostIdValuesShown = 10;
-
-/// The key by which ID values are compared: the value in units of 1e-37, computed in 64 bits with the single-precision
-/// constants 1.0e37 and 0.1. Empty if it does not fit into 32 bits: such a value is not an ID value.
 std::optional<std::int32_t> idKey(double value) {
   const double scaled = value * static_cast<double>(1.0e37F) + static_cast<double>(0.1F);
   if (!(std::abs(scaled) < static_cast<double>(std::numeric_limits<std::int32_t>::max()))) return std::nullopt;
   return static_cast<std::int32_t>(scaled);
 }
+
+namespace {
+
+/// A placeholder's name is padded to this length, so that every value has at least 11 characters.
+constexpr std::size_t kMinimumNameLength = 9;
+constexpr std::size_t kMostIdValuesShown = 10;
 
 /// Position of the exponent letter of an ID value in `line`: the later of the first one in lower and the first one in
 /// upper case; exponents of three digits are looked for before those of two.
@@ -97,10 +96,6 @@ std::string convertLine(std::string_view templateName, std::size_t lineNumber, s
 }
 
 }  // namespace
-
-bool isSameIdValue(double a, double b) {
-  return idKey(a) == idKey(b);
-}
 
 std::optional<FoundIdValue> findIdValue(std::string_view text, std::span<const ModelParameter> parameters) {
   std::vector<ModelParameter> withIds;

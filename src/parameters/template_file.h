@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstdint>
+#include <optional>
 #include <span>
 #include <string>
 #include <string_view>
@@ -25,8 +26,9 @@ struct ParameterFileItem {
   std::string templateFileName;
 };
 
-/// Whether a numeric-ID template cannot tell two ID values from each other.
-bool isSameIdValue(double a, double b);
+/// The key by which ID values are compared: the value in units of 1e-37, computed in 64 bits with the single-precision
+/// constants 1.0e37 and 0.1. Empty if it does not fit into 32 bits: such a value is not an ID value.
+std::optional<std::int32_t> idKey(double value);
 
 /// Converts a numeric-ID template into a delimiter template, with its delimiter line. `templateName` is used in
 /// messages. Throws FatalError for an ID value that no parameter has, for a token that ends like an ID value but is not

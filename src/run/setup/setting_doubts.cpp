@@ -3,7 +3,10 @@
 #include <algorithm>
 #include <cmath>
 #include <cstddef>
+#include <cstdint>
 #include <filesystem>
+#include <string_view>
+#include <unordered_map>
 
 #include <fmt/core.h>
 
@@ -22,14 +25,14 @@ bool isSameFile(const std::string& a, const std::string& b) {
 }
 
 void warnOfParameterFiles(const RunConfig& config, const SectionsRead& sections) {
+  // By name: a link is replaced by a file of its own when it is written.
+  std::unordered_map<std::string_view, std::size_t> first;
   for (std::size_t i = 0; i < config.parameterFiles.size(); ++i) {
-    for (std::size_t earlier = 0; earlier < i; ++earlier) {
-      if (!isSameFile(config.parameterFiles[i].paramFileName, config.parameterFiles[earlier].paramFileName)) continue;
-      sections.parameterFiles[i].warn(
-          "ParamFileName", fmt::format("{} writes this file, too; the model gets what is written last, from this item",
-                                       sections.parameterFiles[earlier].name()));
-      break;
-    }
+    const auto [earlier, isNew] = first.try_emplace(config.parameterFiles[i].paramFileName, i);
+    if (isNew) continue;
+    sections.parameterFiles[i].warn(
+        "ParamFileName", fmt::format("{} writes this file, too; the model gets what is written last, from this item",
+                                     sections.parameterFiles[earlier->second].name()));
   }
 }
 
@@ -38,16 +41,17 @@ void warnOfIdValues(const RunConfig& config, const SectionsRead& sections) {
       std::any_of(config.parameterFiles.begin(), config.parameterFiles.end(),
                   [](const ParameterFileItem& item) { return item.templateType == TemplateType::numericId; });
   if (!areUsed) return;
+  std::unordered_map<std::int32_t, const ModelParameter*> first;
   for (std::size_t i = 0; i < config.parameters.size(); ++i) {
     const ModelParameter& parameter = config.parameters[i];
-    const auto earlier = std::find_if(config.parameters.begin(), config.parameters.begin() + std::ptrdiff_t(i),
-                                      [&parameter](const ModelParameter& other) {
-                                        return other.idValue != 0.0 && isSameIdValue(other.idValue, parameter.idValue);
-                                      });
-    if (parameter.idValue == 0.0 || earlier == config.parameters.begin() + std::ptrdiff_t(i)) continue;
+    const auto key = idKey(parameter.idValue);
+    if (parameter.idValue == 0.0 || !key) continue;
+    const auto [earlier, isNew] = first.try_emplace(*key, &parameter);
+    if (isNew) continue;
     sections.parameters[i].warn(
-        "Parameter_IDValue", fmt::format("taken for that of parameter {}, {}: ID values must differ by 1e-37 or more",
-                                         quotedForMessage(earlier->name), formatReal(earlier->idValue)));
+        "Parameter_IDValue",
+        fmt::format("taken for that of parameter {}, {}: ID values must differ by 1e-37 or more",
+                    quotedForMessage(earlier->second->name), formatReal(earlier->second->idValue)));
   }
 }
 

@@ -8,7 +8,7 @@
 
 namespace mirevo {
 
-/// The sections in which the settings of RunConfig stand, for the locations of warnings; of lists one per item.
+/// The sections from which a RunConfig was read, for the locations of warnings; of lists one per item.
 struct SectionsRead {
   std::vector<SetupSection> parameterFiles;
   std::vector<SetupSection> parameters;

@@ -98,7 +98,7 @@ std::vector<std::string> unusedParameterWarnings(std::span<const ModelParameter>
   std::vector<double> values(parameters.size());
   const ExpressionEvaluator equations(names, values);
   std::vector<bool> isUsed(parameters.size());
-  /// Marks the parameters and those from which they are computed.
+  // Marks the parameters and those from which they are computed.
   const auto follow = [&](std::vector<std::size_t> toFollow) {
     while (!toFollow.empty()) {
       const std::size_t index = toFollow.back();
