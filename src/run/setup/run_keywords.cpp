@@ -20,7 +20,8 @@ const SectionRow& reservedSection() {
       "Accepted and not used.",
       {unused({.name = "TmemOption", .defaultValue = "0", .meaning = "Not used."}, KeywordType::integer),
        unused({.name = "TmemClient", .defaultValue = "0", .meaning = "Not used."}, KeywordType::integer),
-       unused({.name = "MaxSimTime", .defaultValue = "0.0", .meaning = "Not used."}, KeywordType::real)}};
+       unused({.name = "MaxSimTime", .defaultValue = "0.0", .meaning = "Not used; `MaxSimulationTime` is."},
+              KeywordType::real)}};
   return section;
 }
 
