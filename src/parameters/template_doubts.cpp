@@ -1,6 +1,7 @@
 #include "parameters/template_doubts.h"
 
-#include <algorithm>
+#include <string_view>
+#include <unordered_set>
 
 #include <fmt/core.h>
 
@@ -23,24 +24,22 @@ std::string_view behindDelimiter(std::string_view text) {
   return line.empty() ? line : line.substr(1);
 }
 
-/// The name between two equal marks that begins at `at`, with the marks; empty if there is none.
-std::string_view markedNameAt(std::string_view line, std::size_t at, std::string_view name) {
-  if (at == 0 || kLikelyDelimiters.find(line[at - 1]) == std::string_view::npos) return {};
-  const std::size_t close = line.find_first_not_of(' ', at + name.size());
-  if (close == std::string_view::npos || line[close] != line[at - 1]) return {};
-  return line.substr(at - 1, close - at + 2);
+using Names = std::unordered_set<std::string_view>;
+
+Names namesOf(std::span<const ModelParameter> parameters) {
+  Names names;
+  for (const ModelParameter& parameter : parameters) names.insert(trimBlanks(parameter.name));
+  names.erase("");
+  return names;
 }
 
-/// The first one whose marks are not `delimiter`.
-std::string_view markedNameIn(std::string_view line, std::span<const ModelParameter> parameters, char delimiter) {
-  if (line.find_first_of(kLikelyDelimiters) == std::string_view::npos) return {};
-  for (const ModelParameter& parameter : parameters) {
-    const std::string_view name = trimBlanks(parameter.name);
-    if (name.empty()) continue;
-    for (std::size_t at = line.find(name); at != std::string_view::npos; at = line.find(name, at + 1)) {
-      const std::string_view marked = markedNameAt(line, at, name);
-      if (!marked.empty() && marked.front() != delimiter) return marked;
-    }
+/// The first name between two equal marks other than `delimiter`, with the marks; empty if there is none.
+std::string_view markedNameIn(std::string_view line, const Names& names, char delimiter) {
+  for (std::size_t open = line.find_first_of(kLikelyDelimiters); open != std::string_view::npos;
+       open = line.find_first_of(kLikelyDelimiters, open + 1)) {
+    const std::size_t close = line.find(line[open], open + 1);
+    if (line[open] == delimiter || close == std::string_view::npos) continue;
+    if (names.contains(trimBlanks(line.substr(open + 1, close - open - 1)))) return line.substr(open, close - open + 1);
   }
   return {};
 }
@@ -52,7 +51,7 @@ bool lacksDelimiterLine(std::string_view text, std::span<const ModelParameter> p
   if (behind.empty()) return false;
   const std::string first = toLowerAscii(std::string_view(behind.data() - 1, 1));
   return (first >= "a" && first <= "z") || (first >= "0" && first <= "9") ||
-         !markedNameIn(text.substr(0, text.find('\n')), parameters, kNoDelimiter).empty();
+         !markedNameIn(text.substr(0, text.find('\n')), namesOf(parameters), kNoDelimiter).empty();
 }
 
 /// A parameter's name between two equal characters that may be delimiters.
@@ -64,10 +63,11 @@ struct FoundName {
 /// The first name whose marks are not `delimiter`, behind the delimiter line if there is one.
 std::optional<FoundName> findMarkedName(std::string_view text, std::span<const ModelParameter> parameters,
                                         char delimiter = kNoDelimiter) {
+  const Names names = namesOf(parameters);
   std::size_t number = 0;
   for (const std::string_view line : splitLines(text)) {
     if (++number == 1 && delimiter != kNoDelimiter) continue;
-    if (const std::string_view marked = markedNameIn(line, parameters, delimiter); !marked.empty()) {
+    if (const std::string_view marked = markedNameIn(line, names, delimiter); !marked.empty()) {
       return FoundName{number, std::string(marked)};
     }
   }
