@@ -136,10 +136,10 @@ void SetupSection::takeRow(const KeywordRow& row, void* settings) const {
 }
 
 void SetupSection::takeValue(const KeywordRow& row, const SetupValue& value, bool isDefault, void* settings) const {
-  echo(row, value, isDefault);
+  const bool isFile = row.type == KeywordType::fileName;
+  echo(row, isFile && !isDefault ? SetupValue(written(row.name())) : value, isDefault);
   row.store(settings, value);
   if (!row.facts.bearsOnResults) return;
-  const bool isFile = row.type == KeywordType::fileName;
   file_->resultSettings().push_back({path_, std::string(row.name()),
                                      isFile ? file_->relative(std::get<std::string>(value)) : formatSetupValue(value),
                                      isDefault});
@@ -216,6 +216,14 @@ void SetupSection::refuse(const SettingRefusal& refusal) const {
   refuse(refusal.message, refusal.keyword, refusal.explanation);
 }
 
+void SetupSection::checkAt(std::string_view keyword, const std::function<void()>& check) const {
+  try {
+    check();
+  } catch (const FatalError& error) {
+    refuse(error.message(), keyword, error.detail());
+  }
+}
+
 void SetupSection::warn(std::string_view keyword, std::string_view text) const {
   file_->log().warning(fmt::format("{}: {}: {}", location(keyword), keyword, text));
 }
@@ -230,7 +238,6 @@ std::string SetupSection::written(std::string_view keyword) const {
   return text == nullptr ? std::string{} : std::string(trimTrailing(*text));
 }
 
-/// The location of the keyword's first value, or of the section if the keyword is absent.
 std::string SetupSection::location(std::string_view keyword) const {
   const KdxKeyword* found = node_->keyword(keyword);
   return file_->location(found == nullptr ? node_->position() : found->values.front().position);

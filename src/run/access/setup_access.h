@@ -109,6 +109,10 @@ class SetupSection final {
   void require(const std::optional<SettingRefusal>& refusal) const {
     if (refusal) refuse(*refusal);
   }
+  /// Runs `check`; the keyword's location goes before the detail of a FatalError that it throws.
+  void checkAt(std::string_view keyword, const std::function<void()>& check) const;
+  /// The location of the keyword's first value, or of the section if the keyword is absent: "setup.kdx:14:9".
+  std::string location(std::string_view keyword) const;
   /// A warning in the log with the keyword's location.
   void warn(std::string_view keyword, std::string_view text) const;
   /// A line below the keyword's echo in the log.
@@ -137,7 +141,6 @@ class SetupSection final {
   SetupValue convert(const KeywordRow& row, const KdxKeyword& keyword) const;
   /// Refuses the value of the row unless it is within its range.
   void checkRange(const KeywordRow& row, const BoundSection& section) const;
-  std::string location(std::string_view keyword) const;
   /// The unknown keywords of the section.
   std::vector<std::string> unknownKeywords() const;
   /// Refuses a keyword that is absent, and would have its default, if an unknown one differs from it by one edit.

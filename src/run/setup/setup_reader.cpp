@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <array>
 #include <filesystem>
+#include <optional>
 #include <unordered_map>
 
 #include <fmt/core.h>
@@ -10,7 +11,10 @@
 #include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/text.h"
+#include "parameters/read_template.h"
+#include "platform/processes/argument_text.h"
 #include "run/access/file_validation.h"
+#include "run/setup/equation_check.h"
 #include "run/setup/model_keywords.h"
 #include "run/setup/run_keywords.h"
 #include "run/setup/setup_warnings.h"
@@ -59,9 +63,12 @@ class SetupReader final {
   void checkBatchItem(const SetupSection& section, const BatchItem& item);
   void refuseNameOfSetup(const std::string& path, std::string_view keyword, const SetupSection& section) const;
   void checkParameterFile(const SetupSection& section, const ParameterFileItem& item) const;
+  void checkTemplates() const;
   void readModelParameters();
   void readInternalConstraints();
   void readObjectiveFunctions();
+  static void readReference(const SetupSection& section, const SettingSection<SeriesReference>& keywords,
+                            SeriesReference& reference);
   void readSeries(const SetupSection& section, OutputMeasure& measure) const;
   void connectMeasures(const std::vector<SetupSection>& measureSections);
   void readSavedFiles();
@@ -72,8 +79,10 @@ class SetupReader final {
   SetupFile& file_;
   SetupSection target_;
   RunConfig config_;
+  std::vector<SetupSection> parameterFileSections_;
   std::vector<SetupSection> parameterSections_;
   std::vector<SetupSection> objectiveSections_;
+  std::optional<EquationCheck> equations_;  ///< over the parameters, once they are read
 };
 
 void SetupReader::readSimulationOption() {
@@ -84,9 +93,12 @@ void SetupReader::readSimulationOption() {
       .readItems("SIMBATCHITEM_", batchItemSection(), config_.batchItems, "Error: No model simulation sequence defined",
                  [this](const SetupSection& opened, const BatchItem& item) { checkBatchItem(opened, item); });
   section.open("SIMPARAM")
-      .readItems(
-          "SIMPARAMITEM_", parameterFileSection(), config_.parameterFiles, "Error: No model parameter files defined",
-          [this](const SetupSection& opened, const ParameterFileItem& item) { checkParameterFile(opened, item); });
+      .readItems("SIMPARAMITEM_", parameterFileSection(), config_.parameterFiles,
+                 "Error: No model parameter files defined",
+                 [this](const SetupSection& opened, const ParameterFileItem& item) {
+                   checkParameterFile(opened, item);
+                   parameterFileSections_.push_back(opened);
+                 });
 }
 
 void SetupReader::checkBatchItem(const SetupSection& section, const BatchItem& item) {
@@ -100,6 +112,10 @@ void SetupReader::checkBatchItem(const SetupSection& section, const BatchItem& i
   validateInBaseFolder(path, config_.baseFolder, kKeyword, section);
   validateFileExists(path, kKeyword, section);
   refuseNameOfSetup(path, kKeyword, section);
+  if (std::string reason; !splitArguments(item.arguments, reason)) {
+    section.refuse("Error: Unable to initialise MirevoSimpleLaunch", "Arguments",
+                   fmt::format("{}, found {}", reason, quotedForMessage(item.arguments)));
+  }
 }
 
 void SetupReader::refuseNameOfSetup(const std::string& path, std::string_view keyword,
@@ -166,13 +182,26 @@ void SetupReader::readModelParameters() {
     list.refuse("Error: No variable model parameters defined", kItemCountKeyword,
                 "expected a parameter with Parameter_Type = 0, found none");
   }
+  equations_.emplace(config_.parameters);
+  equations_->checkDependentParameters(config_.parameters, parameterSections_);
+  checkTemplates();
+}
+
+/// Which parameters there are is known only after the templates' section was read.
+void SetupReader::checkTemplates() const {
+  for (std::size_t i = 0; i < parameterFileSections_.size(); ++i) {
+    parameterFileSections_[i].checkAt("TemplateFileName",
+                                      [&] { readTemplate(config_.parameterFiles[i], config_.parameters); });
+  }
 }
 
 void SetupReader::readInternalConstraints() {
   target_.open("MODEL_PARAMETERS")
       .open("INTERNAL_CONSTRAINTS")
       .readItems("CONSTRAINT_", constraintSection(), config_.constraints,
-                 [](const SetupSection&, const InternalConstraint&) {});
+                 [this](const SetupSection& section, const InternalConstraint& constraint) {
+                   equations_->checkConstraint(constraint, section);
+                 });
 }
 
 void SetupReader::readObjectiveFunctions() {
@@ -198,6 +227,15 @@ void SetupReader::readObjectiveFunctions() {
   if (!config_.task || !config_.task->mayHaveInitialSample()) requireScales(false);
 }
 
+/// Files of series are opened when the whole setup has been read; what is wrong with them is then told with its
+/// location.
+void SetupReader::readReference(const SetupSection& section, const SettingSection<SeriesReference>& keywords,
+                                SeriesReference& reference) {
+  section.read(keywords, reference);
+  reference.fileLocation = section.location("File_Name") + ": File_Name: ";
+  reference.itemLocation = section.location("Item_No") + ": Item_No: ";
+}
+
 void SetupReader::readSeries(const SetupSection& section, OutputMeasure& measure) const {
   const std::int64_t number = std::ssize(config_.measures);
   // A measure that the model writes itself needs no series; its sections are read if present.
@@ -206,7 +244,7 @@ void SetupReader::readSeries(const SetupSection& section, OutputMeasure& measure
     return needsSeries ? std::optional(section.open(name)) : section.openIfPresent(name);
   };
   if (const auto simulated = open("SIMULATION_FILE")) {
-    simulated->read(simulationFileSection(), measure.simulation);
+    readReference(*simulated, simulationFileSection(), measure.simulation);
     if (measure.simulation.fileName.empty() && needsSeries) {
       simulated->refuse(withNumber("Error: No output file defined for output measure No. %", number), "File_Name",
                         "expected the name of a file");
@@ -216,7 +254,7 @@ void SetupReader::readSeries(const SetupSection& section, OutputMeasure& measure
     }
   }
   if (const auto observed = open("OBSERVATION_FILE")) {
-    observed->read(observationFileSection(), measure.observation);
+    readReference(*observed, observationFileSection(), measure.observation);
     if (measure.observation.fileName.empty() && needsSeries) {
       observed->refuse(withNumber("Error: No observation file defined for output measure No. %", number), "File_Name",
                        "expected the name of a file");

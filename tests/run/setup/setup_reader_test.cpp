@@ -94,6 +94,17 @@ TEST_F(SetupReaderTest, RefusesWhatCannotBeReadAndSaysWhere) {
 }
 
 TEST_F(SetupReaderTest, StopsAtTheFirstInvalidValueBeforeLaterSectionsAreRead) {
+  const std::tuple<const char*, const char*, const char*> ofParameters[] = {
+      {"'Depth + Rate' => 'Depth +'", "Error: Unable to create the expression", "\nsetup.kdx:46:28: "},
+      {"'Depth + Rate' => 'Sum + Rate'", "Illegal relationship between dependent parameters 3 and 3",
+       "\nsetup.kdx:46:28: Parameter_Equation: the equation of \"Sum\" names itself"},
+      {"Parameter_Name = 'Depth' => 'Deep' & 'Depth + Rate' => 'Rate'", "Error: Parameter name Depth in template file",
+       "\nsetup.kdx:15:28: TemplateFileName: model/soil.tpl:2:1: "},
+  };
+  for (const auto& [edits, message, detail] : ofParameters) {
+    EXPECT_THAT(failure(edits + std::string(" & [INTERNAL_CONSTRAINTS] => [X] & [/INTERNAL_CONSTRAINTS] => [/X]")),
+                AllOf(StartsWith(message), HasSubstr(detail)));
+  }
   EXPECT_THAT(
       failure("Aggregation_Method = 0 => 9 & [SAVE_OUTPUT_FILES] => [SAVED] & [/SAVE_OUTPUT_FILES] => [/SAVED]"),
       StartsWith("Error: Objective function aggregation method invalid"));
@@ -115,7 +126,7 @@ TEST_F(SetupReaderTest, EchoesEverySectionAndValueInReadingOrder) {
                               "[MIREVO_SIMULATION_OPTION/SIMBATCH]\n"
                               "  TqSEKdxListItemCount = 1\n"
                               "[MIREVO_SIMULATION_OPTION/SIMBATCH/SIMBATCHITEM_1]\n"
-                              "  BatchFileName = 'model/run.sh'\n"
+                              "  BatchFileName = 'model\\run.sh'\n"
                               "  Arguments = '' (default)\n"
                               "[MIREVO_SIMULATION_OPTION/SIMPARAM]\n"));
   EXPECT_THAT(log, HasSubstr("  KeyLine = 'soil'\n  KeyLine = 'depth'\n"));
