@@ -8,6 +8,7 @@
 
 #include <fmt/core.h>
 
+#include "common/encoding.h"
 #include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/text.h"
@@ -342,7 +343,12 @@ void SetupReader::readMeasureFile() {
 
 RunConfig readSetup(const std::string& fileName, std::string_view text, RunLog& log, bool usesMpiWorkers) {
   const SetupLocation location = locateSetup(fileName);
-  SetupFile file(std::string(trim(fileName)), location.folder, text, setupSchema(), log);
+  const std::string name(trim(fileName));
+  const DecodedText decoded = decodeText(text);
+  if (decoded.encoding != "UTF-8") {
+    log.warning(fmt::format("{}: the text is not UTF-8 and is read as {}", name, decoded.encoding));
+  }
+  SetupFile file(name, location.folder, decoded.text, setupSchema(), log);
   warnAboutUnusedEntries(file);
   return SetupReader(file, location, usesMpiWorkers).read();
 }

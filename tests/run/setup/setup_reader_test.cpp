@@ -114,6 +114,18 @@ TEST_F(SetupReaderTest, StopsAtTheFirstInvalidValueBeforeLaterSectionsAreRead) {
       << "a section that the run does not need may be absent";
 }
 
+TEST_F(SetupReaderTest, ASetupInAnotherEncodingIsReadLikeOneInUtf8) {
+  const std::string text = edited("'Upper catchment   ' => 'Südliches Gebiet'");
+  std::string latin1 = text;
+  latin1.replace(latin1.find("ü"), 2, "\xFC");
+  const std::string utf8Log = logOfText(text);
+  EXPECT_THAT(utf8Log, HasSubstr("  Title = 'Südliches Gebiet'\n"));
+  EXPECT_EQ(logOfText(latin1), "Warning: setup.kdx: the text is not UTF-8 and is read as Latin-1\n" + utf8Log);
+  std::string utf16 = "\xFF\xFE";
+  for (const char c : latin1) (utf16 += c) += '\0';
+  EXPECT_EQ(logOfText(utf16), "Warning: setup.kdx: the text is not UTF-8 and is read as UTF-16\n" + utf8Log);
+}
+
 TEST_F(SetupReaderTest, EchoesEverySectionAndValueInReadingOrder) {
   const std::string log = logOf("");
   EXPECT_THAT(log, StartsWith("[MIREVO_PARAMETERS]\n"
