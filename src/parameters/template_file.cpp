@@ -58,7 +58,8 @@ std::size_t findParameter(std::string_view asWritten, std::span<const ModelParam
   if (!paired) {
     detail += fmt::format("the delimiter {} has no partner in its line", delimiter);
   } else {
-    detail += fmt::format("no parameter has the name that stands here between two {}", delimiter);
+    detail +=
+        fmt::format("no parameter has the name {}, which is between two {} here", quotedForMessage(name), delimiter);
     std::vector<std::string> names;
     for (const ModelParameter& parameter : parameters) names.emplace_back(trimTrailing(parameter.name));
     if (const auto nearest = nearestName(name, names)) detail += fmt::format("\ndid you mean \"{}\"?", *nearest);

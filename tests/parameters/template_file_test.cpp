@@ -121,7 +121,8 @@ TEST(ParameterTemplate, RefusesWhatItCannotFill) {
       {"!\n!!", "Error: Parameter name  in template file  invalid", "t:2:1: no parameter"},
       {"!\n!   !", "Error: Parameter name  in template file  invalid", "t:2:1: no parameter"},
       {"!\n!K! !Maning channel !", "Error: Parameter name Maning channel in template file Maning channel invalid",
-       "t:2:5: no parameter has the name that stands here between two !\ndid you mean \"Manning channel\"?"},
+       "t:2:5: no parameter has the name \"Maning channel\", which is between two ! here\ndid you mean \"Manning "
+       "channel\"?"},
       {"!\n!k!", "Error: Parameter name k in template file k invalid", "did you mean \"K\"?"},
   };
   for (const auto& [text, message, detail] : cases) {

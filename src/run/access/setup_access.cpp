@@ -25,6 +25,21 @@ std::string inside(std::string_view path, std::string_view name) {
   return path.empty() ? std::string(name) : fmt::format("{}/{}", path, name);
 }
 
+/// The names of the first item sections whose number is above `count`, in file order.
+std::string namesBeyond(const KdxSection& node, std::string_view prefix, std::int32_t count) {
+  constexpr int kMostNames = 8;
+  std::string names;
+  int found = 0;
+  for (const auto& section : node.sections()) {
+    const std::string_view name = section->name();
+    if (!name.starts_with(prefix) || itemPattern(name) == name) continue;
+    const auto number = parseInteger(name.substr(prefix.size()));
+    if ((number && *number <= count) || ++found > kMostNames) continue;
+    names += fmt::format("{}{}", names.empty() ? "" : ", ", name);
+  }
+  return found > kMostNames ? names + ", ..." : names;
+}
+
 /// What the keyword accepts, if a text without quotes was written for a coded value.
 std::string wantedInstead(const KdxUnquotedText& found, const SetupSchema& schema) {
   std::string pattern;
@@ -92,6 +107,10 @@ void SetupSection::echoName() const {
 
 SetupSection SetupSection::open(std::string_view name) const {
   if (auto section = openIfPresent(name)) return *std::move(section);
+  failMissing(name, {});
+}
+
+void SetupSection::failMissing(std::string_view name, std::string_view addition) const {
   std::vector<std::string> unknown;
   for (const auto& section : node_->sections()) {
     const std::string path = inside(pattern_, itemPattern(section->name()));
@@ -99,12 +118,19 @@ SetupSection SetupSection::open(std::string_view name) const {
   }
   const std::string where = node_->name().empty() ? std::string("in the file") : "in section " + node_->name();
   fatalError(fmt::format("Error: Unable to open section {} in KDX file", name),
-             fmt::format("{}: expected section [{}] {}{}", file_->location(node_->position()), name, where,
-                         didYouMean(name, unknown)));
+             fmt::format("{}: expected section [{}] {}{}{}", file_->location(node_->position()), name, where,
+                         didYouMean(name, unknown), addition));
 }
 
 SetupSection SetupSection::openItem(std::string_view prefix, std::size_t number) const {
-  return open(fmt::format("{}{}", prefix, number));
+  const std::string name = fmt::format("{}{}", prefix, number);
+  if (auto section = openIfPresent(name)) return *std::move(section);
+  const std::string present = namesBeyond(*node_, prefix, 0);
+  const KdxKeyword* count = node_->keyword(kItemCountKeyword);
+  const auto* wanted = count == nullptr ? nullptr : std::get_if<std::int32_t>(&count->values.front().value);
+  if (wanted == nullptr) failMissing(name, {});
+  failMissing(name, fmt::format("\n{}: {} is {}, and there are here: {}", location(kItemCountKeyword),
+                                kItemCountKeyword, *wanted, present.empty() ? "none" : present));
 }
 
 std::string SetupSection::name() const {
@@ -192,8 +218,8 @@ std::size_t SetupSection::readCount(std::string_view itemPrefix) const {
   echo(row, SetupValue(count), false);
   if (count < 0) refuseToRead(keyword->position, row.name(), fmt::format("expected 0 or more, found {}", count));
   if (present > static_cast<std::size_t>(count)) {
-    warn(row.name(),
-         fmt::format("{} sections {}n stand here, those beyond {} are not read", present, itemPrefix, count));
+    warn(row.name(), fmt::format("there are {} sections {}n here, those beyond {} are not read: {}", present,
+                                 itemPrefix, count, namesBeyond(*node_, itemPrefix, count)));
   }
   return static_cast<std::size_t>(count);
 }

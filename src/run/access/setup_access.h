@@ -136,6 +136,8 @@ class SetupSection final {
       readItem(opened, items.back());
     }
   }
+  /// Throws FatalError with "Error: Unable to open section ..."; `addition` ends its detail.
+  [[noreturn]] void failMissing(std::string_view name, std::string_view addition) const;
   void takeRow(const KeywordRow& row, void* settings) const;
   void takeValue(const KeywordRow& row, const SetupValue& value, bool isDefault, void* settings) const;
   SetupValue convert(const KeywordRow& row, const KdxKeyword& keyword) const;

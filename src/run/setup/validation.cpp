@@ -101,7 +101,9 @@ std::optional<SettingRefusal> validateProcessCount(const RunConfig& config) {
   if (!only) return std::nullopt;
   return SettingRefusal{
       std::string(only->refusal), kSlotsKeyword,
-      fmt::format("expected 1 with this {}, found {}", only->keyword, config.simultaneousSimulations)};
+      fmt::format("expected 1 with this {}, found {}{}{}", only->keyword, config.simultaneousSimulations,
+                  only->atOnceUnderMpi.empty() ? "" : "; a job of several processes (MPI) runs at once: ",
+                  only->atOnceUnderMpi)};
 }
 
 }  // namespace mirevo

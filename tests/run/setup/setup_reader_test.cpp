@@ -83,7 +83,8 @@ TEST_F(SetupReaderTest, RefusesWhatCannotBeReadAndSaysWhere) {
        " section SIMPARAM in KDX file\nsetup.kdx:2:3: expected section [SIMPARAM] in section MIREVO_SIMULATION_OPTION; "
        "found \"SIMPARAMS\", did you mean \"SIMPARAM\"?"},
       {"TqSEKdxListItemCount = 3 => 4",
-       " section PARAMETER_4 in KDX file\nsetup.kdx:19:3: expected section [PARAMETER_4] in section MODEL_PARAMETERS"},
+       " section PARAMETER_4 in KDX file\nsetup.kdx:19:3: expected section [PARAMETER_4] in section MODEL_PARAMETERS\n"
+       "setup.kdx:20:28: TqSEKdxListItemCount is 4, and there are here: PARAMETER_1, PARAMETER_2, PARAMETER_3"},
       {"[SimultaneousSimulations] => [Simultaneous] & [/SimultaneousSimulations] => [/Simultaneous]",
        " section SimultaneousSimulations in KDX file\nsetup.kdx:1:1: expected section [SimultaneousSimulations] in "
        "section MIREVO_PARAMETERS"},
@@ -165,7 +166,8 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatEndASearchEarly
       {"[SCENARIOS] => [Scenario][/Scenario][SCENARIOS]",
        "setup.kdx:103:3: section \"Scenario\" is unknown and not read, did you mean \"SCENARIOS\"?"},
       {"TqSEKdxListItemCount = 3 => 2",
-       "setup.kdx:20:28: TqSEKdxListItemCount: 3 sections PARAMETER_n stand here, those beyond 2 are not read"},
+       "setup.kdx:20:28: TqSEKdxListItemCount: there are 3 sections PARAMETER_n here, those beyond 2 are not read: "
+       "PARAMETER_3\n"},
       {"Function_Name = 'Flow' => ''",
        "setup.kdx:91:16: Name: no output measure has this Function_Name, the objective function is always 0"},
       {"Use_Surrogate_Model = 1 => 2", "setup.kdx:123:27: Use_Surrogate_Model: neither 0 nor 1, no search will be run"},
@@ -198,7 +200,7 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatEndASearchEarly
       {"Algorithm_Type = 1 => 0 & Max_No_Evaluations = 500 => 27",
        "Max_No_Evaluations: the initial sample of 28 sets is cut to 27"},
       {"Algorithm_Type = 1 => 2 & Max_No_Evaluations = 500 => 10",
-       "Dynamically Dimensioned Search uses no surrogate model"},
+       "Dynamically Dimensioned Search uses no surrogate model: the search is the same as with 0, "},
   };
   for (const auto& [edits, warning] : cases) {
     const std::string log = logOf(edits);

@@ -124,7 +124,7 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
       {"Algorithm_Type = 1 => 2", "Use Population Simplex Evolution algorithm for application with multiple processors",
        "expected 1 with this Algorithm_Type, found 4"},
       {"Algorithm_Type = 1 => 0", "Use Population Simplex Evolution algorithm for application with multiple processors",
-       ""},
+       "found 4; a job of several processes (MPI) runs at once: one proposal of each complex"},
       // Scale and location that nothing can give
       {"Option = 2 => 3 & Aggregation_Method = 0 => 1",
        "Standard deviation and location not defined for objective function Flow",
