@@ -25,6 +25,30 @@ std::string inside(std::string_view path, std::string_view name) {
   return path.empty() ? std::string(name) : fmt::format("{}/{}", path, name);
 }
 
+/// A path with item numbers as `n`.
+std::string patternOf(std::string_view path) {
+  std::string pattern;
+  for (const std::string_view name : splitAt(path, '/')) pattern = inside(pattern, itemPattern(name));
+  return pattern;
+}
+
+bool isThere(const KdxSection& target, std::string_view path) {
+  const KdxSection* node = &target;
+  for (const std::string_view name : splitAt(path, '/')) {
+    if (node = node->section(name); node == nullptr) return false;
+  }
+  return true;
+}
+
+/// A section as it is to be added, with the keywords that have no default.
+std::string linesOfSection(std::string_view parent, std::string_view name, const SectionRow& row) {
+  std::string lines = fmt::format("\n   in [{}]:\n   [{}]", parent.empty() ? kSetupTarget : parent, name);
+  for (const KeywordRow& keyword : row.keywords) {
+    if (keyword.isRequired()) lines += fmt::format("\n     {} = ...", keyword.name());
+  }
+  return lines + fmt::format("\n   [/{}]", name);
+}
+
 /// The names of the first item sections whose number is above `count`, in file order.
 std::string namesBeyond(const KdxSection& node, std::string_view prefix, std::int32_t count) {
   constexpr int kMostNames = 8;
@@ -64,12 +88,38 @@ KdxDocument parsed(const std::string& fileName, std::string_view text, const Set
 
 SetupFile::SetupFile(const std::string& fileName, std::string folder, std::string_view text, const SetupSchema& schema,
                      RunLog& log)
-    : document_(parsed(fileName, text, schema)), folder_(std::move(folder)), schema_(schema), log_(log) {}
+    : document_(parsed(fileName, text, schema)), folder_(std::move(folder)), schema_(schema), log_(log) {
+  for (const SectionRow* row : schema_.sections()) {
+    if (row->readWhen == "always") needed_.push_back(row);
+  }
+}
 
 SetupSection SetupFile::target() {
   const SetupSection root(*this, document_.root, "", "");
   root.open(kSetupTarget);
   return {*this, *document_.root.section(kSetupTarget), "", ""};
+}
+
+void SetupFile::need(const std::vector<const SectionRow*>& sections) {
+  needed_.insert(needed_.end(), sections.begin(), sections.end());
+}
+
+std::string SetupFile::linesToAdd(std::string_view parent, std::string_view opened, bool isOpenedListed) const {
+  const KdxSection* target = document_.root.section(kSetupTarget);
+  if (target == nullptr) return {};
+  const std::string missing = inside(parent, opened);
+  std::string lines;
+  if (const SectionRow* row = schema_.findSection(patternOf(missing)); row != nullptr && isOpenedListed) {
+    lines += linesOfSection(parent, opened, *row);
+  }
+  for (const SectionRow* row : needed_) {
+    if (row->path == missing || isThere(*target, row->path)) continue;
+    const std::size_t slash = row->path.rfind('/');
+    const bool isTop = slash == std::string_view::npos;
+    lines += linesOfSection(isTop ? std::string_view{} : row->path.substr(0, slash),
+                            isTop ? row->path : row->path.substr(slash + 1), *row);
+  }
+  return lines.empty() ? lines : "\nsections to add:" + lines;
 }
 
 std::string SetupFile::location(KdxPosition position) const {
@@ -116,10 +166,11 @@ void SetupSection::failMissing(std::string_view name, std::string_view addition)
     const std::string path = inside(pattern_, itemPattern(section->name()));
     if (file_->schema().findSection(path) == nullptr) unknown.push_back(section->name());
   }
+  const std::string meant = didYouMean(name, unknown);
   const std::string where = node_->name().empty() ? std::string("in the file") : "in section " + node_->name();
   fatalError(fmt::format("Error: Unable to open section {} in KDX file", name),
-             fmt::format("{}: expected section [{}] {}{}{}", file_->location(node_->position()), name, where,
-                         didYouMean(name, unknown), addition));
+             fmt::format("{}: expected section [{}] {}{}{}", file_->location(node_->position()), name, where, meant,
+                         addition.empty() ? file_->linesToAdd(path_, name, meant.empty()) : addition));
 }
 
 SetupSection SetupSection::openItem(std::string_view prefix, std::size_t number) const {

@@ -46,6 +46,12 @@ class SetupFile final {
   /// are unchanged.
   std::string relative(const std::string& path) const;
 
+  /// The run needs these sections, too, and not only those that are always read.
+  void need(const std::vector<const SectionRow*>& sections);
+  /// The needed sections that the setup lacks, as lines to add to it: those of `opened`, a section that is missing in
+  /// `parent`, come first. `isOpenedListed`: false if it is there under another name.
+  std::string linesToAdd(std::string_view parent, std::string_view opened, bool isOpenedListed) const;
+
   /// Every setting that affects the results, in reading order.
   std::vector<ResultSetting>& resultSettings() { return resultSettings_; }
 
@@ -54,6 +60,7 @@ class SetupFile final {
   std::string folder_;
   const SetupSchema& schema_;
   RunLog& log_;
+  std::vector<const SectionRow*> needed_;
   std::vector<ResultSetting> resultSettings_;
 };
 

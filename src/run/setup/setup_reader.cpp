@@ -89,7 +89,15 @@ class SetupReader final {
 void SetupReader::readSimulationOption() {
   const SetupSection section = target_.open("MIREVO_SIMULATION_OPTION");
   section.read(simulationOptionSection(), config_);
-  if (!config_.task) section.warn("Option", "no task has this number, nothing will be run");
+  if (config_.task) {
+    // Those that are read whatever the task's own settings are, as its first one.
+    std::vector<const SectionRow*> rows = config_.task->sections();
+    const std::string_view always = rows.front()->readWhen;
+    std::erase_if(rows, [always](const SectionRow* row) { return row->readWhen != always; });
+    file_.need(rows);
+  } else {
+    section.warn("Option", "no task has this number, nothing will be run");
+  }
   section.open("SIMBATCH")
       .readItems("SIMBATCHITEM_", batchItemSection(), config_.batchItems, "Error: No model simulation sequence defined",
                  [this](const SetupSection& opened, const BatchItem& item) { checkBatchItem(opened, item); });

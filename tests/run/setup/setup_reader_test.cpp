@@ -87,7 +87,15 @@ TEST_F(SetupReaderTest, RefusesWhatCannotBeReadAndSaysWhere) {
        "setup.kdx:20:28: TqSEKdxListItemCount is 4, and there are here: PARAMETER_1, PARAMETER_2, PARAMETER_3"},
       {"[SimultaneousSimulations] => [Simultaneous] & [/SimultaneousSimulations] => [/Simultaneous]",
        " section SimultaneousSimulations in KDX file\nsetup.kdx:1:1: expected section [SimultaneousSimulations] in "
-       "section MIREVO_PARAMETERS"},
+       "section MIREVO_PARAMETERS\nsections to add:\n   in [MIREVO_PARAMETERS]:\n   [SimultaneousSimulations]\n   "
+       "[/SimultaneousSimulations]"},
+      {"[SAVE_OUTPUT_FILES] => [Saved] & [/SAVE_OUTPUT_FILES] => [/Saved] & [STOPPING_CRITERIA] => [Stops] & "
+       "[/STOPPING_CRITERIA] => [/Stops]",
+       " section SAVE_OUTPUT_FILES in KDX file\nsetup.kdx:1:1: expected section [SAVE_OUTPUT_FILES] in section "
+       "MIREVO_PARAMETERS\nsections to add:\n   in [MIREVO_PARAMETERS]:\n   [SAVE_OUTPUT_FILES]\n   "
+       "[/SAVE_OUTPUT_FILES]\n   in [OPTIMISATION_ALGORITHM]:\n   [STOPPING_CRITERIA]\n     Max_No_Evaluations = ...\n "
+       "  "
+       "[/STOPPING_CRITERIA]"},
   };
   for (const auto& [edits, error] : others) EXPECT_EQ(failure(edits), std::string("Error: Unable to open") + error);
   EXPECT_EQ(failure(title(longText.substr(1) + "   ")), "") << "trailing blanks do not count";
