@@ -32,7 +32,7 @@ class RunCancelled final : public std::exception {
 };
 
 /// Aborts the run: throws FatalError, after which the run driver ends the run in a fixed order (log, model processes,
-/// MPI, progress report, exit code 1). `detail` is written to the log as further lines below the message.
+/// MPI, progress report, exit code 1). `detail` is written to the log above the message, which is its last record.
 [[noreturn]] void fatalError(std::string_view message, std::string_view detail = {});
 
 }  // namespace mirevo

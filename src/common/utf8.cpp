@@ -20,4 +20,49 @@ Utf8Character firstCharacter(std::string_view text) {
   return {code, length, true};
 }
 
+bool isValidUtf8(std::string_view text) {
+  while (!text.empty()) {
+    const Utf8Character first = firstCharacter(text);
+    if (!first.isValid) return false;
+    text.remove_prefix(first.bytes);
+  }
+  return true;
+}
+
+std::size_t characterCount(std::string_view text) {
+  std::size_t count = 0;
+  for (; !text.empty(); ++count) text.remove_prefix(firstCharacter(text).bytes);
+  return count;
+}
+
+std::string withValidUtf8(std::string_view text) {
+  std::string valid;
+  valid.reserve(text.size());
+  while (!text.empty()) {
+    const Utf8Character first = firstCharacter(text);
+    valid += first.isValid ? text.substr(0, first.bytes) : std::string_view("\xEF\xBF\xBD");
+    text.remove_prefix(first.bytes);
+  }
+  return valid;
+}
+
+void appendUtf8(std::string& text, char32_t code) {
+  const auto inside = [&text, code](int shift) { text += static_cast<char>(0x80U | (code >> shift & 0x3FU)); };
+  if (code < 0x80) {
+    text += static_cast<char>(code);
+  } else if (code < 0x800) {
+    text += static_cast<char>(0xC0U | code >> 6);
+    inside(0);
+  } else if (code < 0x10000) {
+    text += static_cast<char>(0xE0U | code >> 12);
+    inside(6);
+    inside(0);
+  } else {
+    text += static_cast<char>(0xF0U | code >> 18);
+    inside(12);
+    inside(6);
+    inside(0);
+  }
+}
+
 }  // namespace mirevo

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <string>
 #include <string_view>
 
 namespace mirevo {
@@ -17,6 +18,17 @@ struct Utf8Character {
 /// The first character of `text`, which must not be empty; one invalid byte if it does not begin with a valid
 /// character.
 Utf8Character firstCharacter(std::string_view text);
+
+bool isValidUtf8(std::string_view text);
+
+/// How many characters the text has; each invalid byte counts as one.
+std::size_t characterCount(std::string_view text);
+
+/// The text with U+FFFD in place of each invalid byte.
+std::string withValidUtf8(std::string_view text);
+
+/// Appends a character, which must be a valid one.
+void appendUtf8(std::string& text, char32_t code);
 
 /// Whether this byte continues a character and does not begin one.
 constexpr bool isInsideCharacter(char byte) {

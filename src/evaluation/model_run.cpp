@@ -18,7 +18,7 @@
 #include "common/files.h"
 #include "common/text.h"
 #include "measures/measure_file.h"
-#include "parameters/template_doubts.h"
+#include "parameters/read_template.h"
 #include "platform/processes/process_folder.h"
 
 namespace mirevo {
@@ -141,20 +141,10 @@ std::vector<std::string> ModelRunner::readTemplates() {
   std::vector<std::string> converted;
   const std::vector<ModelParameter>& parameters = parameters_.parameters();
   for (const ParameterFileItem& item : description_.parameterFiles) {
-    const std::string name(trimTrailing(item.templateFileName));
-    const bool isNumericId = item.templateType == TemplateType::numericId;
-    std::string reason;
-    const auto text = readTextFile(name, reason);
-    if (!text)
-      fatalError((isNumericId ? "Error: Unable to open " : "Error: Unable to open template file ") + name, reason);
-    try {
-      converted.push_back(isNumericId ? ConvertIdTemplate(name, *text, parameters) : std::string());
-      templates_.emplace_back(name, isNumericId ? converted.back() : *text, parameters, isNumericId);
-    } catch (const FatalError& error) {
-      fatalError(error.message(), error.detail() + hintOnMisreadTemplate(item.templateType, *text, parameters));
-    }
-    const std::vector<std::string> doubts = templateDoubts(templates_.back(), item.templateType, *text, parameters);
-    templateWarnings_.insert(templateWarnings_.end(), doubts.begin(), doubts.end());
+    ReadTemplate read = readTemplate(item, parameters);
+    templates_.push_back(std::move(read.filled));
+    templateWarnings_.insert(templateWarnings_.end(), read.doubts.begin(), read.doubts.end());
+    converted.push_back(std::move(read.converted));
   }
   return converted;
 }

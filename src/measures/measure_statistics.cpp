@@ -60,6 +60,15 @@ std::string describeSpan(const SeriesItem& item) {
                      times.size(), formatReal(times.back() - times.front()));
 }
 
+/// If there are no observations in the period: that this, and not the simulated file, is at fault.
+std::string describeLackOf(const MeasureStatistics& statistics, const SeriesItem& observation) {
+  if (statistics.observationCount > 0) return {};
+  return fmt::format(
+      "there is nothing to compare with: item No. {} ({}) of the observed {} has no value in the "
+      "evaluation period\n",
+      observation.item, observation.series.itemName(observation.item), observation.fileName);
+}
+
 /// Calls `use(time, observed, simulated)` for every observation in the period that is not missing, in order, with
 /// its time in days on the simulation's axis and the simulated value there, if there is one; stops when that is false.
 template <typename Use>
@@ -101,8 +110,9 @@ MeasureStatistics collectPairs(const SeriesItem& simulation, const SeriesItem& o
   if (statistics.simulatedValues.empty()) {
     fatalError(withNumber("Error: No simulated data found at observation times for item No. % in ", simulation.item) +
                    simulation.fileName,
-               fmt::format("the evaluation period is {} to {}\n{}\n{}", formatDate(period.start),
-                           formatDate(period.end), describeSpan(simulation), describeSpan(observation)));
+               fmt::format("{}the evaluation period is {} to {}\n{}\n{}", describeLackOf(statistics, observation),
+                           formatDate(period.start), formatDate(period.end), describeSpan(simulation),
+                           describeSpan(observation)));
   }
   if (firstUnused) {
     constexpr double kDaySeconds = 86400.0;
@@ -165,7 +175,8 @@ void addPeakStatistics(const SeriesItem& simulation, const SeriesItem& observati
 void requireItem(TimeSeriesObject& series, const SeriesReference& reference) {
   const std::string name(trimTrailing(reference.fileName));
   if (reference.itemNo < 1 || reference.itemNo > series.itemCount()) {
-    std::string detail = fmt::format("the file has {} item{}", series.itemCount(), series.itemCount() == 1 ? "" : "s");
+    std::string detail = reference.itemLocation +
+                         fmt::format("the file has {} item{}", series.itemCount(), series.itemCount() == 1 ? "" : "s");
     constexpr int kMostNames = 20;
     for (int item = 1; item <= std::min(series.itemCount(), kMostNames); ++item) {
       detail += fmt::format("\n{}: {}", item, series.itemName(item));

@@ -25,6 +25,10 @@ enum class StatisticType : std::int32_t {
 struct SeriesReference {
   std::string fileName;  ///< absolute; trailing blanks trimmed
   std::int32_t itemNo = 1;
+  /// What begins the detail of an error in the file name or in the item, "setup.kdx:75:23: File_Name: "; empty if it is
+  /// not known.
+  std::string fileLocation = {};
+  std::string itemLocation = {};
 };
 
 /// A comparison of a simulated with an observed series, reduced to one number, or a number that the model wrote.

@@ -43,17 +43,19 @@ std::optional<std::string> findUnusable(TimeSeriesObject& series, const std::str
 
 }  // namespace
 
-std::unique_ptr<TimeSeriesObject> openTimeSeries(const std::string& fileName) {
+std::unique_ptr<TimeSeriesObject> openTimeSeries(const std::string& fileName, const std::string& setupLocation) {
   const std::string name(trimTrailing(fileName));
   std::string reason;
   std::unique_ptr<TimeSeriesObject> series = createTimeSeriesObject(name, reason);
-  if (!series) fatalError("Error creating TS object for file: " + name, reason);
-  if (!series->open(name)) fatalError("Error opening TS object for file: " + name, series->lastError());
+  if (!series) fatalError("Error creating TS object for file: " + name, setupLocation + reason);
+  if (!series->open(name)) fatalError("Error opening TS object for file: " + name, setupLocation + series->lastError());
   return series;
 }
 
 SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> measures, const EvaluationPeriod& period) {
   SeriesTables tables;
+  std::vector<std::string> observationLocations;  // of the measure that names a file first
+  std::vector<std::string> simulationLocations;
   for (const OutputMeasure& measure : measures) {
     if (measure.interfaceType != InterfaceType::timeSeries) {
       tables.observationIndex_.push_back(kNoSeries);
@@ -61,7 +63,13 @@ SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> mea
       continue;
     }
     tables.observationIndex_.push_back(indexOf(tables.observationNames_, measure.observation.fileName));
+    if (tables.observationNames_.size() > observationLocations.size()) {
+      observationLocations.push_back(measure.observation.fileLocation);
+    }
     tables.simulationIndex_.push_back(indexOf(tables.simulationNames_, measure.simulation.fileName));
+    if (tables.simulationNames_.size() > simulationLocations.size()) {
+      simulationLocations.push_back(measure.simulation.fileLocation);
+    }
     tables.simulationItems_.resize(tables.simulationNames_.size());
     tables.simulationItems_[tables.simulationIndex_.back()].push_back(measure.simulation.itemNo);
   }
@@ -70,8 +78,12 @@ SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> mea
     std::sort(items.begin(), items.end());
     items.erase(std::unique(items.begin(), items.end()), items.end());
   }
-  for (const std::string& name : tables.observationNames_) tables.observations_.push_back(openTimeSeries(name));
-  tables.openSimulationFiles(tables.simulationNames_);
+  for (std::size_t i = 0; i < observationLocations.size(); ++i) {
+    tables.observations_.push_back(openTimeSeries(tables.observationNames_[i], observationLocations[i]));
+  }
+  for (std::size_t i = 0; i < simulationLocations.size(); ++i) {
+    tables.simulations_.push_back(openTimeSeries(tables.simulationNames_[i], simulationLocations[i]));
+  }
   tables.checkItems(measures, period);
   tables.releaseSimulationFiles();
   return tables;

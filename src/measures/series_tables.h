@@ -57,7 +57,7 @@ class SeriesTables final {
 };
 
 /// Creates and opens one file. Throws FatalError with "Error creating TS object for file: " or
-/// "Error opening TS object for file: " and the name; the detail holds the location.
-std::unique_ptr<TimeSeriesObject> openTimeSeries(const std::string& fileName);
+/// "Error opening TS object for file: " and the name; the detail holds the location, after `setupLocation`.
+std::unique_ptr<TimeSeriesObject> openTimeSeries(const std::string& fileName, const std::string& setupLocation = {});
 
 }  // namespace mirevo

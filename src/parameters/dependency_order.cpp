@@ -17,7 +17,8 @@ bool names(NamedParameters named, std::size_t i, std::size_t j) {
   return std::binary_search(named[i].begin(), named[i].end(), j);
 }
 
-void refuseMutualDependencies(std::span<const ModelParameter> parameters, NamedParameters named) {
+std::optional<IllegalRelationship> findMutualDependency(std::span<const ModelParameter> parameters,
+                                                        NamedParameters named) {
   for (std::size_t i = 0; i < named.size(); ++i) {
     for (const std::size_t j : named[i]) {
       if (parameters[j].parameterType != ParameterType::dependent || !names(named, j, i)) continue;
@@ -25,12 +26,15 @@ void refuseMutualDependencies(std::span<const ModelParameter> parameters, NamedP
           i == j ? fmt::format("the equation of \"{}\" names itself", trimTrailing(parameters[i].name))
                  : fmt::format("\"{}\" and \"{}\" name each other in their equations", trimTrailing(parameters[i].name),
                                trimTrailing(parameters[j].name));
-      fatalError(fmt::format("Illegal relationship between dependent parameters {} and {} in the Model Parameters "
-                             "list. Two dependent parameters cannot depend mutually on each other !!",
-                             i + 1, j + 1),
-                 detail);
+      return IllegalRelationship{
+          i,
+          fmt::format("Illegal relationship between dependent parameters {} and {} in the Model Parameters "
+                      "list. Two dependent parameters cannot depend mutually on each other !!",
+                      i + 1, j + 1),
+          detail};
     }
   }
+  return std::nullopt;
 }
 
 /// The parameters of a cycle of dependencies, each naming the next and the last the first; empty when there is none. A
@@ -68,9 +72,9 @@ std::vector<std::size_t> findRing(NamedParameters named) {
   return {};
 }
 
-void refuseRings(std::span<const ModelParameter> parameters, NamedParameters named) {
+std::optional<IllegalRelationship> describeRing(std::span<const ModelParameter> parameters, NamedParameters named) {
   const std::vector<std::size_t> ring = findRing(named);
-  if (ring.empty()) return;
+  if (ring.empty()) return std::nullopt;
   std::string positions;
   std::string chain;
   for (std::size_t k = 0; k < ring.size(); ++k) {
@@ -79,10 +83,12 @@ void refuseRings(std::span<const ModelParameter> parameters, NamedParameters nam
     chain += fmt::format("\"{}\" names ", trimTrailing(parameters[ring[k]].name));
   }
   chain += fmt::format("\"{}\"", trimTrailing(parameters[ring.front()].name));
-  fatalError(fmt::format("Illegal relationship between dependent parameters {} in the Model Parameters list. Dependent "
-                         "parameters cannot depend on each other in a ring !!",
-                         positions),
-             chain);
+  return IllegalRelationship{
+      ring.front(),
+      fmt::format("Illegal relationship between dependent parameters {} in the Model Parameters list. Dependent "
+                  "parameters cannot depend on each other in a ring !!",
+                  positions),
+      chain};
 }
 
 /// A permutation of 0..N-1 in which an element is moved, and the order of two compared, in constant time on average: a
@@ -139,9 +145,14 @@ class OrderedList final {
 
 }  // namespace
 
+std::optional<IllegalRelationship> findIllegalRelationship(std::span<const ModelParameter> parameters,
+                                                           NamedParameters named) {
+  const auto mutual = findMutualDependency(parameters, named);
+  return mutual ? mutual : describeRing(parameters, named);
+}
+
 std::vector<int> OrderDependentParameters(std::span<const ModelParameter> parameters, NamedParameters named) {
-  refuseMutualDependencies(parameters, named);
-  refuseRings(parameters, named);
+  if (const auto illegal = findIllegalRelationship(parameters, named)) fatalError(illegal->message, illegal->detail);
 
   OrderedList list(parameters.size());
   std::vector<bool> isSettled(parameters.size(), false);

@@ -10,6 +10,7 @@
 
 #include "common/fatal_error.h"
 #include "common/text.h"
+#include "common/utf8.h"
 #include "parameters/template_doubts.h"
 #include "parameters/template_file.h"
 #include "parameters/template_lines.h"
@@ -85,7 +86,8 @@ std::string convertLine(std::string_view templateName, std::size_t lineNumber, s
 
     std::string placeholder(1, kConvertedDelimiter);
     placeholder += trimTrailing(parameter->name);
-    placeholder.resize(std::max(placeholder.size(), kMinimumNameLength + 1), ' ');
+    const std::size_t nameLength = characterCount(placeholder) - 1;
+    if (nameLength < kMinimumNameLength) placeholder.append(kMinimumNameLength - nameLength, ' ');
     placeholder += kConvertedDelimiter;
     const std::size_t from = s + 1;
     line.replace(from, end - from, placeholder);

@@ -8,6 +8,7 @@
 
 #include <fmt/core.h>
 
+#include "common/encoding.h"
 #include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/take_text.h"
@@ -43,7 +44,8 @@ char readDelimiter(std::string_view templateName, std::string_view line) {
 }
 
 /// Index of the first parameter with this name, without trailing blanks; the number of parameters if there is none.
-std::size_t findParameter(std::string_view name, std::span<const ModelParameter> parameters) {
+std::size_t findParameter(std::string_view asWritten, std::span<const ModelParameter> parameters) {
+  const std::string name = decodeText(asWritten).text;  // a template may be Latin-1; the setup is UTF-8 here
   const auto found = std::find_if(parameters.begin(), parameters.end(), [name](const ModelParameter& parameter) {
     return trimBlanks(parameter.name) == name;
   });
@@ -56,7 +58,8 @@ std::size_t findParameter(std::string_view name, std::span<const ModelParameter>
   if (!paired) {
     detail += fmt::format("the delimiter {} has no partner in its line", delimiter);
   } else {
-    detail += fmt::format("no parameter has the name that stands here between two {}", delimiter);
+    detail +=
+        fmt::format("no parameter has the name {}, which is between two {} here", quotedForMessage(name), delimiter);
     std::vector<std::string> names;
     for (const ModelParameter& parameter : parameters) names.emplace_back(trimTrailing(parameter.name));
     if (const auto nearest = nearestName(name, names)) detail += fmt::format("\ndid you mean \"{}\"?", *nearest);
@@ -93,7 +96,8 @@ void ParameterTemplate::takeLine(std::string_view line, int lineNumber, char del
       failUnknownName(templateName_, lineNumber, open, paired, delimiter, name, parameters);
     }
     pieces_.back() += line.substr(copied, open - copied);
-    placeholders_.push_back({parameter, static_cast<int>(close - open) + 1, lineNumber});
+    placeholders_.push_back(
+        {parameter, static_cast<int>(characterCount(line.substr(open, close - open + 1))), lineNumber});
     pieces_.emplace_back();
     copied = close + 1;
   }

@@ -2,6 +2,7 @@
 
 #include <fmt/core.h>
 
+#include "common/encoding.h"
 #include "common/fatal_error.h"
 #include "common/text.h"
 #include "parameters/template_file.h"
@@ -20,6 +21,7 @@ void failLongLine(std::string_view templateName, std::size_t lineNumber, std::si
 }
 
 std::vector<std::string_view> templateLines(std::string_view templateName, std::string_view text) {
+  if (isUtf16(text)) fatalError(fmt::format("Error: Unable to open template file {}", templateName), kUtf16Refusal);
   std::vector<std::string_view> lines = splitLines(text);
   for (std::size_t i = 0; i < lines.size(); ++i) {
     lines[i] = trimBlanks(lines[i]);

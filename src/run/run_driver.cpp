@@ -401,22 +401,38 @@ void RunDriver::closeResultsOfEarlyEnd(const Ending& ending) {
 }
 
 int RunDriver::endInError(std::string_view message, std::string_view detail) {
-  std::string text(trimTrailing(message));
+  const std::string text(trimTrailing(message));
+  std::string explained = text;
   if (!text.empty()) {
-    if (!detail.empty()) text.append("\n").append(detail);
-    if (reporter_ && reporter_->failedCount() > 0)
-      text +=
-          fmt::format("\nfailed model runs are described in {}", fileNameOf(results_->failedRuns().paths().forPeople));
-    if (!isAccepted_) state_.log.markRefused();
-    state_.log.line("");
-    if (reporter_) logFailures();
-    state_.log.line(text);
-    showMessage(text);
+    std::string details(detail);
+    if (reporter_ && reporter_->failedCount() > 0) {
+      details += fmt::format("{}failed model runs are described in {}", details.empty() ? "" : "\n",
+                             fileNameOf(results_->failedRuns().paths().forPeople));
+    }
+    if (!details.empty()) explained += "\n" + details;
+    endLogInError(text, details);
+    showMessage(explained);
   }
-  closeResultsOfEarlyEnd({RunStage::failed, std::string(message), text});
+  closeResultsOfEarlyEnd({RunStage::failed, std::string(message), explained});
   if (launcher_) launcher_->haltProcesses();  // before the report, which takes time
   reportRun();
   return endEarly(message);
+}
+
+/// The message is the log's last record, after an empty one; what explains it stands above. Whatever is warned of
+/// afterwards goes to the user and the message file alone.
+void RunDriver::endLogInError(std::string_view message, std::string_view details) {
+  const EndingSignalsHeld held;  // or a signal's message could come below
+  if (reporter_) logFailures();
+  if (!details.empty()) state_.log.line(fmt::format("\n{}", details));
+  if (!isAccepted_) state_.log.markRefused();
+  state_.log.line(fmt::format("\n{}", message));
+  signalState.runLogDescriptor = -1;
+  state_.log.close();
+  state_.log.passWarningsTo([this](std::string_view text) {
+    state_.progress.writeMessage(text);
+    showMessage(text, {}, MessageType::warning);
+  });
 }
 
 int RunDriver::endCancelled(std::string_view message) {

@@ -70,6 +70,7 @@ class RunDriver final {
   void finish(const TaskOutcome& outcome);
   void logFailures();
   int endInError(std::string_view message, std::string_view detail);
+  void endLogInError(std::string_view message, std::string_view details);
   int endCancelled(std::string_view message);
   /// Closes the log, halts the model processes, leaves the job and ends the progress.
   int endEarly(std::string_view ending);

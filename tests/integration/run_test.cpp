@@ -129,7 +129,13 @@ TEST(Scenarios, ASingleRunEvaluatesTheInitialSet) {
 /// What it writes to its standard outputs must not get into the files that it opens.
 TEST(FailedRuns, ARunWithItsStandardOutputsClosedLeavesTheSameResults) {
   const ModelFolder folder;
-  EXPECT_EQ(runProgram({folder.writeSetup({.option = 0, .modelArguments = "--fail-above 3"})}).exitCode, 1);
+  std::filesystem::create_directory(folder / "basin_Report.html.tmp");  // in the way of the report
+  const ProgramResult run = runProgram({folder.writeSetup({.option = 0, .modelArguments = "--fail-above 3"})});
+  EXPECT_EQ(run.exitCode, 1);
+  EXPECT_THAT(run.error, AllOf(StartsWith("Mirevo: Error: Unable to continue. No of failed"),
+                               HasSubstr("Mirevo: Warning: The report cannot be written")));
+  EXPECT_THAT(folder.read("basin.log"),
+              EndsWith("\n\nError: Unable to continue. No of failed simulations too high.\n"));
   const std::string results = withoutDates(folder.read("basin.dat"));
   EXPECT_THAT(results, HasSubstr("\n1\tFAILED\t4\t1\t1e+30\t1e+30\t1e+30\n# Error: Unable to continue. No of"));
   EXPECT_THAT(folder.read("calSimErr.dat"), HasSubstr("a = 4 is too large"));

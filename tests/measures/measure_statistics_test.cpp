@@ -140,7 +140,8 @@ TEST(MeasureStatistics, FailuresHaveTheirFixedTextsAndSayMore) {
       {"Error: Item No. 0 not found in /base/obs.csv", "the file has 1 item", run(1, 0, {1}, kJanuary)},
       {"Error getting time properties of TS object of file /base/sim.csv", "no time step", run(1, 1, {}, kJanuary)},
       {"Error: No simulated data found at observation times for item No. 1 in /base/sim.csv",
-       "the evaluation period is 2002-01-01 00:00 to 2002-01-02 00:00\n"
+       "\nthere is nothing to compare with: item No. 1 (item 1) of the observed /base/obs.csv has no value in the "
+       "evaluation period\nthe evaluation period is 2002-01-01 00:00 to 2002-01-02 00:00\n"
        "/base/sim.csv begins 2001-01-01 00:00 and has 2 time steps over 1 days",
        run(1, 1, {1, 2}, {{2002, 1, 1}, {2002, 1, 2}})},
       {"Error: No simulated data found at observation times for item No. 1 in /base/sim.csv", "",

@@ -46,7 +46,12 @@ TEST_F(SeriesTablesTest, MeasuresShareTheFilesTheyNameAlike) {
 TEST_F(SeriesTablesTest, SetupFailuresEndTheRun) {
   folder_.write("bad.csv", "time,Q\n2001-01-01,1,2\n");
   folder_.write("text.csv", "time,Q\n2001-01-01,bad\n");
+  OutputMeasure located = measure("sim.csv", "gone.csv");
+  located.observation.fileLocation = "s.kdx:7:9: File_Name: ";
+  OutputMeasure withItem = measure("sim.csv", "obs.csv", 3);
+  withItem.simulation.itemLocation = "s.kdx:8:9: Item_No: ";
   const std::tuple<OutputMeasure, std::string, std::string> cases[] = {
+      {withItem, "Error: Item No. 3 not found in " + folder_ / "sim.csv", "\ns.kdx:8:9: Item_No: the file has 2 items"},
       {measure("gone.csv", "obs.csv"), "Error opening TS object for file: " + folder_ / "gone.csv",
        folder_ / "gone.csv" + ": No such file or directory"},
       {measure("sim.csv", "gone.csv "), "Error opening TS object for file: " + folder_ / "gone.csv", "No such file"},
@@ -54,6 +59,8 @@ TEST_F(SeriesTablesTest, SetupFailuresEndTheRun) {
       {measure("sim.csv", "bad.csv"), "Error opening TS object for file: " + folder_ / "bad.csv", "bad.csv:2:1:"},
       {measure("sim.csv", "obs.csv", 3), "Error: Item No. 3 not found in " + folder_ / "sim.csv",
        "the file has 2 items\n1: Q\n2: H"},
+      {located, "Error opening TS object for file: " + folder_ / "gone.csv",
+       "\ns.kdx:7:9: File_Name: " + folder_ / "gone.csv" + ": No such file"},
       {measure("sim.csv", "text.csv"), "Error getting data of TS item in " + folder_ / "text.csv", "text.csv:2:12:"},
   };
   for (const auto& [measure, message, detail] : cases) {

@@ -22,7 +22,8 @@ std::vector<ModelParameter> parameters() {
   };
   return {make("K", 1.0e-35, 0.5, 0.01, 100),  make("Manning channel", 1.5e-35, 0.03, 0.01, 0.2),
           make("a 1.1e-35", 1.1e-35, 1, 0, 2), make("K2  ", 1.2e-35, 50, 10, 99),
-          make("no id", 0, 1, 0, 2),           make(" K", 1.2e-35, 1, 0, 2)};
+          make("no id", 0, 1, 0, 2),           make(" K", 1.2e-35, 1, 0, 2),
+          make("größe", 1.9e-35, 1, 0, 2)};
 }
 
 std::string converted(const std::string& line) {
@@ -48,6 +49,7 @@ TEST(ConvertIdTemplate, ReplacesIdValues) {
       {"x 1.1e-35 1e-35", "x !a 1.1e-35! !K        !"},
       // The first of two parameters with one ID value; its name without trailing blanks.
       {"x 12E-036 1.2e-35", "x 12E-036 !K2       !"},
+      {"x 1.9e-35", "x !größe    !"},
       {"x 0e-35", "x !no id    !"},
       {"1.0E-0", "1.0E-0"},
   };
@@ -82,7 +84,7 @@ TEST(ConvertIdTemplate, KeepsLinesAndEndsThemAlike) {
 }
 
 TEST(ParameterTemplate, FillsPlaceholders) {
-  const std::vector<double> values{12.5, 0, 1, 1e100, 5, 7};
+  const std::vector<double> values{12.5, 0, 1, 1e100, 5, 7, 9};
   const std::tuple<const char*, const char*> cases[] = {
       {"$\nplain   \n", "plain\n"},
       {"$", ""},
@@ -97,6 +99,11 @@ TEST(ParameterTemplate, FillsPlaceholders) {
       {"!\n   !K                        !  \n!K                        !x",
        "                   12.5\n                12.5       x\n"},
       {"!\nx!K2        !", "x*\n"},
+      // A width is one of characters, in a template in Latin-1, too.
+      {"!\n!größe!|", "      9|\n"},
+      {"!\n!gr\xF6\xDF"
+       "e!|",
+       "      9|\n"},
   };
   for (const auto& [text, expected] : cases) {
     EXPECT_EQ(ParameterTemplate("t", text, parameters()).fill(values), expected) << text;
@@ -111,10 +118,12 @@ TEST(ParameterTemplate, RefusesWhatItCannotFill) {
       {"1\n1K1", "Error: Delimiter not defined in template file t", "\"1\" is a character of numbers"},
       {"§\n§K§", "Error: Delimiter not defined in template file t", "single-byte"},
       {"!\n\nab !K", "Error: Parameter name  in template file  invalid", "t:3:4: the delimiter ! has no partner"},
+      {"\xFF\xFE!", "Error: Unable to open template file t", "the file is UTF-16 text; save it as UTF-8"},
       {"!\n!!", "Error: Parameter name  in template file  invalid", "t:2:1: no parameter"},
       {"!\n!   !", "Error: Parameter name  in template file  invalid", "t:2:1: no parameter"},
       {"!\n!K! !Maning channel !", "Error: Parameter name Maning channel in template file Maning channel invalid",
-       "t:2:5: no parameter has the name that stands here between two !\ndid you mean \"Manning channel\"?"},
+       "t:2:5: no parameter has the name \"Maning channel\", which is between two ! here\ndid you mean \"Manning "
+       "channel\"?"},
       {"!\n!k!", "Error: Parameter name k in template file k invalid", "did you mean \"K\"?"},
   };
   for (const auto& [text, message, detail] : cases) {

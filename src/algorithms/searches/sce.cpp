@@ -144,7 +144,8 @@ const SearchFacts& SceMethod::facts() const {
                                       .longName = "Shuffled Complex Evolution",
                                       .usesSurrogate = true,
                                       .drawsInitialSample = true,
-                                      .needsRanges = true};
+                                      .needsRanges = true,
+                                      .runsAtOnceUnderMpi = "one proposal of each complex"};
   return kFacts;
 }
 

@@ -25,6 +25,8 @@ struct SearchFacts {
   bool usesSurrogate = false;       ///< a surrogate model can choose among its proposals
   bool drawsInitialSample = false;  ///< it begins with the sample that the section INITIAL_SAMPLE describes
   bool needsRanges = false;         ///< it uses the range of each parameter, which must not be empty
+  /// Of a search that does not fill several slots: what a job of several processes runs at once all the same.
+  std::string_view runsAtOnceUnderMpi = {};
 };
 
 /// A keyword whose value is small for the number of variable parameters: the search may end early.

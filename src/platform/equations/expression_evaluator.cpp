@@ -19,11 +19,6 @@ constexpr std::size_t kMaximumNameLength = 255;
 /// Longest equation that is shown with a mark below the position of an error.
 constexpr std::size_t kMaximumShownEquation = 160;
 
-/// Characters of UTF-8 text.
-std::size_t characterCount(std::string_view text) {
-  return text.size() - static_cast<std::size_t>(std::count_if(text.begin(), text.end(), isInsideCharacter));
-}
-
 std::string describe(std::string_view equation, const EquationError& error) {
   const std::size_t column = characterCount(equation.substr(0, error.position));
   std::string detail = fmt::format("column {}: {}", column + 1, error.what);

@@ -131,8 +131,12 @@ class KdxParser final {
       separator = ',';
     } while (cursor_.peek() == separator);
     if (!cursor_.atLineEndOrComment()) {
-      return fail(cursor_.position(),
-                  fmt::format("expected ',' or the end of the line after a value, found {}", cursor_.describeNext()));
+      const bool isText = std::holds_alternative<std::string>(keyword.values.back().value);
+      return fail(
+          cursor_.position(),
+          fmt::format(
+              "expected ',' or the end of the line after a value, found {}{}", cursor_.describeNext(),
+              isText ? "; write a quote inside a text twice, or put the text between quotes of the other kind" : ""));
     }
     open_.back()->addKeyword(std::move(keyword));
     return true;

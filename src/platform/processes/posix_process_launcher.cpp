@@ -104,6 +104,12 @@ std::string printable(std::string_view line) {
   return std::string(trimTrailing(text));
 }
 
+/// What a shell tells with its own codes (POSIX.1-2017, 2.8.2).
+std::string_view meaningOfCode(int status) {
+  if (status == 127) return " (a shell: command not found)";
+  return status == 126 ? " (a shell: command not executable)" : "";
+}
+
 }  // namespace
 
 PosixProcessLauncher::~PosixProcessLauncher() {
@@ -310,7 +316,8 @@ void PosixProcessLauncher::finishItem(Slot& slot, int code, int status) {
                     fmt::format("{} was ended by signal {}{}", name, status,
                                 description == nullptr ? "" : fmt::format(" ({})", description))};
   } else if (status != 0) {
-    slot.failure = {BatchFailure::Kind::exitCode, status, fmt::format("{} exited with code {}", name, status)};
+    slot.failure = {BatchFailure::Kind::exitCode, status,
+                    fmt::format("{} exited with code {}{}", name, status, meaningOfCode(status))};
   } else if (slot.item + 1 < slot.commands.size()) {
     ++slot.item;
     startItem(slot);

@@ -6,7 +6,9 @@
 #include <utility>
 
 #include "common/calendar.h"
+#include "common/encoding.h"
 #include "common/files.h"
+#include "common/take_text.h"
 #include "common/text.h"
 #include "common/utf8.h"
 #include "platform/series/csv_cells.h"
@@ -29,6 +31,18 @@ std::optional<char> findSeparator(std::string_view header) {
   return std::nullopt;
 }
 
+bool isTimeOfDay(std::string_view cell) {
+  const auto hour = takeNumber(cell, 1, 2);
+  if (!hour || !takeText(cell, ":") || !takeNumber(cell, 2, 2)) return false;
+  return cell.empty() || cell.front() == ':';
+}
+
+/// What goes behind a fault in a row, if the cell that comes after the date or in place of a value is a time of day.
+std::string hintOfTwoColumns(std::string_view cell) {
+  if (!isTimeOfDay(cell)) return {};
+  return "; the date and the time of day must be in one column, such as 2001-01-31 12:30";
+}
+
 }  // namespace
 
 bool CsvTimeSeries::open(const std::string& fileName) {
@@ -46,6 +60,10 @@ bool CsvTimeSeries::parse(std::string sourceName, std::string content) {
   clear();
   sourceName_ = std::move(sourceName);
   content_ = std::move(content);
+  if (isUtf16(content_)) {
+    lastError_ = sourceName_ + ": " + std::string(kUtf16Refusal);
+    return false;
+  }
   std::size_t position = content_.starts_with(kByteOrderMark) ? kByteOrderMark.size() : 0;
   if (readPreamble(position) && readRows(position)) return true;
   items_.clear();
@@ -144,7 +162,10 @@ bool CsvTimeSeries::readRow(const char* line, const char* lineEnd, csv::DateScan
     return fail(line, "a valid time like 2001-01-31 12:30", quotedForMessage(csv::cellText(line, cellEnd)));
   }
   if (!times_.empty() && *now <= second) {
-    return fail(line, "a time later than " + formatDate(dateOfSecond(second)), formatDate(dateOfSecond(*now)));
+    const char* const next = std::min(at + 1, lineEnd);
+    const std::string_view after = csv::cellText(next, csv::endOfCell(next, lineEnd, separator_));
+    return fail(line, "a time later than " + formatDate(dateOfSecond(second)),
+                formatDate(dateOfSecond(*now)) + hintOfTwoColumns(after));
   }
   if (times_.empty()) startSecond_ = *now;
   second = *now;
@@ -195,8 +216,9 @@ bool CsvTimeSeries::readCells(std::size_t place, std::vector<Value>& values) {
     if constexpr (std::is_same_v<Value, double>) slow = csv::parseExactCell(cell, cellEnd);
     if (!slow) {
       values.clear();
+      const std::string_view text = csv::cellText(cell, cellEnd);
       return fail(cell, "a number of at most 3.4028235e38 in size, an empty cell, NaN or NA",
-                  quotedForMessage(csv::cellText(cell, cellEnd)));
+                  quotedForMessage(text) + hintOfTwoColumns(text));
     }
     values.push_back(*slow);
   }

@@ -25,6 +25,45 @@ std::string inside(std::string_view path, std::string_view name) {
   return path.empty() ? std::string(name) : fmt::format("{}/{}", path, name);
 }
 
+/// A path with item numbers as `n`.
+std::string patternOf(std::string_view path) {
+  std::string pattern;
+  for (const std::string_view name : splitAt(path, '/')) pattern = inside(pattern, itemPattern(name));
+  return pattern;
+}
+
+bool isThere(const KdxSection& target, std::string_view path) {
+  const KdxSection* node = &target;
+  for (const std::string_view name : splitAt(path, '/')) {
+    if (node = node->section(name); node == nullptr) return false;
+  }
+  return true;
+}
+
+/// A section as it is to be added, with the keywords that have no default.
+std::string linesOfSection(std::string_view parent, std::string_view name, const SectionRow& row) {
+  std::string lines = fmt::format("\n   in [{}]:\n   [{}]", parent.empty() ? kSetupTarget : parent, name);
+  for (const KeywordRow& keyword : row.keywords) {
+    if (keyword.isRequired()) lines += fmt::format("\n     {} = ...", keyword.name());
+  }
+  return lines + fmt::format("\n   [/{}]", name);
+}
+
+/// The names of the first item sections whose number is above `count`, in file order.
+std::string namesBeyond(const KdxSection& node, std::string_view prefix, std::int32_t count) {
+  constexpr int kMostNames = 8;
+  std::string names;
+  int found = 0;
+  for (const auto& section : node.sections()) {
+    const std::string_view name = section->name();
+    if (!name.starts_with(prefix) || itemPattern(name) == name) continue;
+    const auto number = parseInteger(name.substr(prefix.size()));
+    if ((number && *number <= count) || ++found > kMostNames) continue;
+    names += fmt::format("{}{}", names.empty() ? "" : ", ", name);
+  }
+  return found > kMostNames ? names + ", ..." : names;
+}
+
 /// What the keyword accepts, if a text without quotes was written for a coded value.
 std::string wantedInstead(const KdxUnquotedText& found, const SetupSchema& schema) {
   std::string pattern;
@@ -49,12 +88,38 @@ KdxDocument parsed(const std::string& fileName, std::string_view text, const Set
 
 SetupFile::SetupFile(const std::string& fileName, std::string folder, std::string_view text, const SetupSchema& schema,
                      RunLog& log)
-    : document_(parsed(fileName, text, schema)), folder_(std::move(folder)), schema_(schema), log_(log) {}
+    : document_(parsed(fileName, text, schema)), folder_(std::move(folder)), schema_(schema), log_(log) {
+  for (const SectionRow* row : schema_.sections()) {
+    if (row->readWhen == "always") needed_.push_back(row);
+  }
+}
 
 SetupSection SetupFile::target() {
   const SetupSection root(*this, document_.root, "", "");
   root.open(kSetupTarget);
   return {*this, *document_.root.section(kSetupTarget), "", ""};
+}
+
+void SetupFile::need(const std::vector<const SectionRow*>& sections) {
+  needed_.insert(needed_.end(), sections.begin(), sections.end());
+}
+
+std::string SetupFile::linesToAdd(std::string_view parent, std::string_view opened, bool isOpenedListed) const {
+  const KdxSection* target = document_.root.section(kSetupTarget);
+  if (target == nullptr) return {};
+  const std::string missing = inside(parent, opened);
+  std::string lines;
+  if (const SectionRow* row = schema_.findSection(patternOf(missing)); row != nullptr && isOpenedListed) {
+    lines += linesOfSection(parent, opened, *row);
+  }
+  for (const SectionRow* row : needed_) {
+    if (row->path == missing || isThere(*target, row->path)) continue;
+    const std::size_t slash = row->path.rfind('/');
+    const bool isTop = slash == std::string_view::npos;
+    lines += linesOfSection(isTop ? std::string_view{} : row->path.substr(0, slash),
+                            isTop ? row->path : row->path.substr(slash + 1), *row);
+  }
+  return lines.empty() ? lines : "\nsections to add:" + lines;
 }
 
 std::string SetupFile::location(KdxPosition position) const {
@@ -102,19 +167,31 @@ void SetupSection::echoName() const {
 
 SetupSection SetupSection::open(std::string_view name) const {
   if (auto section = openIfPresent(name)) return *std::move(section);
+  failMissing(name, {});
+}
+
+void SetupSection::failMissing(std::string_view name, std::string_view addition) const {
   std::vector<std::string> unknown;
   for (const auto& section : node_->sections()) {
     const std::string path = inside(pattern_, itemPattern(section->name()));
     if (file_->schema().findSection(path) == nullptr) unknown.push_back(section->name());
   }
+  const std::string meant = didYouMean(name, unknown);
   const std::string where = node_->name().empty() ? std::string("in the file") : "in section " + node_->name();
   fatalError(fmt::format("Error: Unable to open section {} in KDX file", name),
-             fmt::format("{}: expected section [{}] {}{}", file_->location(node_->position()), name, where,
-                         didYouMean(name, unknown)));
+             fmt::format("{}: expected section [{}] {}{}{}", file_->location(node_->position()), name, where, meant,
+                         addition.empty() ? file_->linesToAdd(path_, name, meant.empty()) : addition));
 }
 
 SetupSection SetupSection::openItem(std::string_view prefix, std::size_t number) const {
-  return open(fmt::format("{}{}", prefix, number));
+  const std::string name = fmt::format("{}{}", prefix, number);
+  if (auto section = openIfPresent(name)) return *std::move(section);
+  const std::string present = namesBeyond(*node_, prefix, 0);
+  const KdxKeyword* count = node_->keyword(kItemCountKeyword);
+  const auto* wanted = count == nullptr ? nullptr : std::get_if<std::int32_t>(&count->values.front().value);
+  if (wanted == nullptr) failMissing(name, {});
+  failMissing(name, fmt::format("\n{}: {} is {}, and there are here: {}", location(kItemCountKeyword),
+                                kItemCountKeyword, *wanted, present.empty() ? "none" : present));
 }
 
 std::string SetupSection::name() const {
@@ -153,10 +230,10 @@ void SetupSection::takeRow(const KeywordRow& row, void* settings) const {
 }
 
 void SetupSection::takeValue(const KeywordRow& row, const SetupValue& value, bool isDefault, void* settings) const {
-  echo(row, value, isDefault);
+  const bool isFile = row.type == KeywordType::fileName;
+  echo(row, isFile && !isDefault ? SetupValue(written(row.name())) : value, isDefault);
   row.store(settings, value);
   if (!row.facts.bearsOnResults) return;
-  const bool isFile = row.type == KeywordType::fileName;
   file_->resultSettings().push_back({path_, std::string(row.name()),
                                      isFile ? file_->relative(std::get<std::string>(value)) : formatSetupValue(value),
                                      isDefault});
@@ -209,8 +286,8 @@ std::size_t SetupSection::readCount(std::string_view itemPrefix) const {
   echo(row, SetupValue(count), false);
   if (count < 0) refuseToRead(keyword->position, row.name(), fmt::format("expected 0 or more, found {}", count));
   if (present > static_cast<std::size_t>(count)) {
-    warn(row.name(),
-         fmt::format("{} sections {}n stand here, those beyond {} are not read", present, itemPrefix, count));
+    warn(row.name(), fmt::format("there are {} sections {}n here, those beyond {} are not read: {}", present,
+                                 itemPrefix, count, namesBeyond(*node_, itemPrefix, count)));
   }
   return static_cast<std::size_t>(count);
 }
@@ -233,6 +310,14 @@ void SetupSection::refuse(const SettingRefusal& refusal) const {
   refuse(refusal.message, refusal.keyword, refusal.explanation);
 }
 
+void SetupSection::checkAt(std::string_view keyword, const std::function<void()>& check) const {
+  try {
+    check();
+  } catch (const FatalError& error) {
+    refuse(error.message(), keyword, error.detail());
+  }
+}
+
 void SetupSection::warn(std::string_view keyword, std::string_view text) const {
   file_->log().warning(fmt::format("{}: {}: {}", location(keyword), keyword, text));
 }
@@ -247,7 +332,6 @@ std::string SetupSection::written(std::string_view keyword) const {
   return text == nullptr ? std::string{} : std::string(trimTrailing(*text));
 }
 
-/// The location of the keyword's first value, or of the section if the keyword is absent.
 std::string SetupSection::location(std::string_view keyword) const {
   const KdxKeyword* found = node_->keyword(keyword);
   return file_->location(found == nullptr ? node_->position() : found->values.front().position);

@@ -46,6 +46,12 @@ class SetupFile final {
   /// are unchanged.
   std::string relative(const std::string& path) const;
 
+  /// The run needs these sections, too, and not only those that are always read.
+  void need(const std::vector<const SectionRow*>& sections);
+  /// The needed sections that the setup lacks, as lines to add to it: those of `opened`, a section that is missing in
+  /// `parent`, come first. `isOpenedListed`: false if it is there under another name.
+  std::string linesToAdd(std::string_view parent, std::string_view opened, bool isOpenedListed) const;
+
   /// Every setting that affects the results, in reading order.
   std::vector<ResultSetting>& resultSettings() { return resultSettings_; }
 
@@ -54,6 +60,7 @@ class SetupFile final {
   std::string folder_;
   const SetupSchema& schema_;
   RunLog& log_;
+  std::vector<const SectionRow*> needed_;
   std::vector<ResultSetting> resultSettings_;
 };
 
@@ -111,6 +118,10 @@ class SetupSection final {
   void require(const std::optional<SettingRefusal>& refusal) const {
     if (refusal) refuse(*refusal);
   }
+  /// Runs `check`; the keyword's location goes before the detail of a FatalError that it throws.
+  void checkAt(std::string_view keyword, const std::function<void()>& check) const;
+  /// The location of the keyword's first value, or of the section if the keyword is absent: "setup.kdx:14:9".
+  std::string location(std::string_view keyword) const;
   /// A warning in the log with the keyword's location.
   void warn(std::string_view keyword, std::string_view text) const;
   /// A line below the keyword's echo in the log.
@@ -134,12 +145,13 @@ class SetupSection final {
       readItem(opened, items.back());
     }
   }
+  /// Throws FatalError with "Error: Unable to open section ..."; `addition` ends its detail.
+  [[noreturn]] void failMissing(std::string_view name, std::string_view addition) const;
   void takeRow(const KeywordRow& row, void* settings) const;
   void takeValue(const KeywordRow& row, const SetupValue& value, bool isDefault, void* settings) const;
   SetupValue convert(const KeywordRow& row, const KdxKeyword& keyword) const;
   /// Refuses the value of the row unless it is within its range.
   void checkRange(const KeywordRow& row, const BoundSection& section) const;
-  std::string location(std::string_view keyword) const;
   /// The unknown keywords of the section.
   std::vector<std::string> unknownKeywords() const;
   /// Refuses a keyword that is absent, and would have its default, if an unknown one differs from it by one edit.

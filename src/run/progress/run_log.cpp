@@ -28,6 +28,7 @@ bool RunLog::open(const std::string& path, std::string& reason) {
   }
   path_ = path;
   descriptor_ = descriptor;
+  isClosed_ = false;
   const std::string earlier = std::move(pending_);
   pending_.clear();
   write(earlier);
@@ -36,6 +37,7 @@ bool RunLog::open(const std::string& path, std::string& reason) {
 
 void RunLog::close() {
   const int descriptor = std::exchange(descriptor_, -1);
+  isClosed_ = descriptor >= 0;
   if (descriptor < 0 || ::close(descriptor) == 0 || errno == EINTR) return;
   if (writeError_.empty()) writeError_ = std::strerror(errno);
 }
@@ -48,8 +50,10 @@ void RunLog::line(std::string_view text) {
 
 void RunLog::warning(std::string_view text) {
   const std::string record = "Warning: " + std::string(text);
-  line(record);
-  if (++warningCount_ <= static_cast<int>(kMostWarningsKept)) warnings_.emplace_back(text);
+  if (!isClosed_) {
+    line(record);
+    if (++warningCount_ <= static_cast<int>(kMostWarningsKept)) warnings_.emplace_back(text);
+  }
   if (listener_) listener_(record);
 }
 

@@ -26,7 +26,8 @@ class RunLog final {
 
   /// Writes one record; several lines if `text` has line ends.
   void line(std::string_view text);
-  /// Writes a record that begins with "Warning: ", and passes it on to whoever listens.
+  /// Writes a record that begins with "Warning: ", and passes it on to whoever listens. Of a closed log the listener
+  /// alone gets it.
   void warning(std::string_view text);
   /// From now on `listener` gets every warning as it is in the log.
   void passWarningsTo(std::function<void(std::string_view)> listener) { listener_ = std::move(listener); }
@@ -54,6 +55,7 @@ class RunLog final {
   void write(std::string_view record);
 
   int descriptor_ = -1;
+  bool isClosed_ = false;
   std::string path_;
   std::string pending_;  ///< lines written before the file was open
   std::function<void(std::string_view)> listener_;

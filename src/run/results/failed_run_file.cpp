@@ -9,6 +9,7 @@
 #include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/text.h"
+#include "common/utf8.h"
 
 namespace mirevo {
 namespace {
@@ -97,7 +98,7 @@ std::string FailedRunFile::record(std::span<const double> parameterValues, const
     text += fmt::format("{}Last output:\n", kIndent);
     for (const std::string& line : failure.lastOutput) text += fmt::format("{}| {}\n", kIndent, line);
   }
-  return text;
+  return withValidUtf8(text);  // a model may write in another encoding
 }
 
 std::vector<std::string> removeFailedRunFolders(const std::string& prefix, const std::set<int>& numbers) {

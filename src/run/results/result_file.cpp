@@ -10,6 +10,7 @@
 #include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/text.h"
+#include "common/utf8.h"
 
 namespace mirevo {
 namespace {
@@ -17,7 +18,7 @@ namespace {
 /// The lines of `text` as comment lines.
 std::string commentLines(std::string_view text) {
   std::string lines;
-  for (const std::string_view line : splitLines(text)) lines += fmt::format("# {}\n", line);
+  for (const std::string_view line : splitLines(text)) lines += fmt::format("# {}\n", withValidUtf8(line));
   return lines;
 }
 

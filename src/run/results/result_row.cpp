@@ -2,6 +2,10 @@
 
 #include <algorithm>
 #include <concepts>
+#include <set>
+#include <utility>
+
+#include <fmt/core.h>
 
 #include "common/data_table.h"
 #include "common/text.h"
@@ -26,18 +30,41 @@ void addCell(std::string& line, std::string_view cell) {
   line += cell;
 }
 
-/// Writes the headings.
+/// Collects the headings that are the same in every file.
+struct FixedHeadings {
+  std::set<std::string> names;
+  bool operator()(const auto&, const char* name) { return names.insert(name).second; }
+  bool operator()(const std::vector<double>&, const std::vector<std::string>&) { return true; }
+};
+
+/// Writes the headings. `used` are those that a named column must not have.
 struct HeaderWriter {
-  std::string line;
+  std::set<std::string> used;
+  bool isUnique = true;  ///< a name that an earlier column has gets a number
+  std::string line = {};
   bool operator()(const auto&, const char* name) {
     addCell(line, name);
     return true;
   }
   bool operator()(const std::vector<double>&, const std::vector<std::string>& names) {
-    for (const std::string& name : names) addCell(line, columnName(name));
+    for (const std::string& name : names) {
+      const std::string plain = columnName(name);
+      std::string heading = plain;
+      for (int k = 2; isUnique && !used.insert(heading).second; ++k) heading = fmt::format("{} ({})", plain, k);
+      addCell(line, heading);
+    }
     return true;
   }
 };
+
+std::string headerOf(const ResultColumns& columns, bool isUnique) {
+  const ResultRow none;
+  FixedHeadings fixed;
+  visitColumns(none, columns, fixed);
+  HeaderWriter writer{std::move(fixed.names), isUnique};
+  visitColumns(none, columns, writer);
+  return writer.line;
+}
 
 struct RowWriter {
   std::string line;
@@ -89,6 +116,15 @@ struct RowReader {
   }
 };
 
+bool hasHeadings(std::string_view header, std::string_view expected) {
+  RowReader given{header};
+  RowReader wanted{expected};
+  while (!given.isAtEnd && !wanted.isAtEnd) {
+    if (trim(given.next()) != trim(wanted.next())) return false;
+  }
+  return given.isAtEnd && wanted.isAtEnd;
+}
+
 }  // namespace
 
 ResultColumns resultColumns(const RunConfig& config, const SearchSpace& space) {
@@ -106,10 +142,7 @@ ResultRow resultRow(std::span<const double> parameterValues, const EvaluationRes
 }
 
 std::string resultHeader(const ResultColumns& columns) {
-  const ResultRow none;
-  HeaderWriter writer;
-  visitColumns(none, columns, writer);
-  return writer.line;
+  return headerOf(columns, true);
 }
 
 std::string resultRowText(const ResultRow& row) {
@@ -129,13 +162,8 @@ bool isResultHeader(std::string_view line) {
 }
 
 bool hasColumns(std::string_view header, const ResultColumns& columns) {
-  const std::string expected = resultHeader(columns);
-  RowReader given{header};
-  RowReader wanted{expected};
-  while (!given.isAtEnd && !wanted.isAtEnd) {
-    if (trim(given.next()) != trim(wanted.next())) return false;
-  }
-  return given.isAtEnd && wanted.isAtEnd;
+  // Files of earlier versions have columns with equal names.
+  return hasHeadings(header, headerOf(columns, true)) || hasHeadings(header, headerOf(columns, false));
 }
 
 std::optional<ResultRow> readResultRow(std::string_view line, const ResultColumns& columns) {

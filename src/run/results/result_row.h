@@ -36,7 +36,7 @@ ResultColumns resultColumns(const RunConfig& config, const SearchSpace& space);
 /// The row of an evaluation; `parameterValues` are on the model scale.
 ResultRow resultRow(std::span<const double> parameterValues, const EvaluationResult& result);
 
-/// The header row, without its line end.
+/// The header row, without its line end. A name that an earlier column has gets a number: "flow (2)".
 std::string resultHeader(const ResultColumns& columns);
 /// A row, without its line end. Numbers read back as the same 64 bits.
 std::string resultRowText(const ResultRow& row);

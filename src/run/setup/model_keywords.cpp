@@ -107,7 +107,7 @@ const SettingSection<ModelParameter>& parameterSection() {
             setting<&Parameter::initialValue>({.name = "Initial_Value",
                                                .unit = "of the parameter",
                                                .meaning = "Value of a fixed parameter, starting point of a variable "
-                                                          "one, which must be within its bounds."}),
+                                                          "one. Within the bounds, whatever the type."}),
             [](const Parameter& parameter) { return validateParameterBounds(parameter); }),
         setting<&Parameter::lowerBound>(
             {.name = "Lower_Bound",

@@ -3,14 +3,19 @@
 #include <algorithm>
 #include <array>
 #include <filesystem>
+#include <optional>
 #include <unordered_map>
 
 #include <fmt/core.h>
 
+#include "common/encoding.h"
 #include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/text.h"
+#include "parameters/read_template.h"
+#include "platform/processes/argument_text.h"
 #include "run/access/file_validation.h"
+#include "run/setup/equation_check.h"
 #include "run/setup/model_keywords.h"
 #include "run/setup/run_keywords.h"
 #include "run/setup/setting_doubts.h"
@@ -51,6 +56,7 @@ class SetupReader final {
     }
     readSimultaneousSimulations();
     readMeasureFile();
+    sections_.parameterFiles = std::move(parameterFileSections_);
     sections_.parameters = std::move(parameterSections_);
     sections_.objectives = std::move(objectiveSections_);
     warnOfDoubtfulSettings(config_, sections_);
@@ -63,9 +69,12 @@ class SetupReader final {
   void checkBatchItem(const SetupSection& section, const BatchItem& item);
   void refuseNameOfSetup(const std::string& path, std::string_view keyword, const SetupSection& section) const;
   void checkParameterFile(const SetupSection& section, const ParameterFileItem& item) const;
+  void checkTemplates() const;
   void readModelParameters();
   void readInternalConstraints();
   void readObjectiveFunctions();
+  static void readReference(const SetupSection& section, const SettingSection<SeriesReference>& keywords,
+                            SeriesReference& reference);
   void readSeries(const SetupSection& section, OutputMeasure& measure) const;
   void connectMeasures(const std::vector<SetupSection>& measureSections);
   void readSavedFiles();
@@ -76,15 +85,25 @@ class SetupReader final {
   SetupFile& file_;
   SetupSection target_;
   RunConfig config_;
+  std::vector<SetupSection> parameterFileSections_;
   std::vector<SetupSection> parameterSections_;
   std::vector<SetupSection> objectiveSections_;
-  SectionsRead sections_;  ///< without those two
+  SectionsRead sections_;                   ///< without those three
+  std::optional<EquationCheck> equations_;  ///< over the parameters, once they are read
 };
 
 void SetupReader::readSimulationOption() {
   const SetupSection section = target_.open("MIREVO_SIMULATION_OPTION");
   section.read(simulationOptionSection(), config_);
-  if (!config_.task) section.warn("Option", "no task has this number, nothing will be run");
+  if (config_.task) {
+    // Those that are read whatever the task's own settings are, as its first one.
+    std::vector<const SectionRow*> rows = config_.task->sections();
+    const std::string_view always = rows.front()->readWhen;
+    std::erase_if(rows, [always](const SectionRow* row) { return row->readWhen != always; });
+    file_.need(rows);
+  } else {
+    section.warn("Option", "no task has this number, nothing will be run");
+  }
   section.open("SIMBATCH")
       .readItems("SIMBATCHITEM_", batchItemSection(), config_.batchItems, "Error: No model simulation sequence defined",
                  [this](const SetupSection& opened, const BatchItem& item) { checkBatchItem(opened, item); });
@@ -93,7 +112,7 @@ void SetupReader::readSimulationOption() {
                  "Error: No model parameter files defined",
                  [this](const SetupSection& opened, const ParameterFileItem& item) {
                    checkParameterFile(opened, item);
-                   sections_.parameterFiles.push_back(opened);
+                   parameterFileSections_.push_back(opened);
                  });
 }
 
@@ -108,6 +127,10 @@ void SetupReader::checkBatchItem(const SetupSection& section, const BatchItem& i
   validateInBaseFolder(path, config_.baseFolder, kKeyword, section);
   validateFileExists(path, kKeyword, section);
   refuseNameOfSetup(path, kKeyword, section);
+  if (std::string reason; !splitArguments(item.arguments, reason)) {
+    section.refuse("Error: Unable to initialise MirevoSimpleLaunch", "Arguments",
+                   fmt::format("{}, found {}", reason, quotedForMessage(item.arguments)));
+  }
 }
 
 void SetupReader::refuseNameOfSetup(const std::string& path, std::string_view keyword,
@@ -174,13 +197,26 @@ void SetupReader::readModelParameters() {
     list.refuse("Error: No variable model parameters defined", kItemCountKeyword,
                 "expected a parameter with Parameter_Type = 0, found none");
   }
+  equations_.emplace(config_.parameters);
+  equations_->checkDependentParameters(config_.parameters, parameterSections_);
+  checkTemplates();
+}
+
+/// Which parameters there are is known only after the templates' section was read.
+void SetupReader::checkTemplates() const {
+  for (std::size_t i = 0; i < parameterFileSections_.size(); ++i) {
+    parameterFileSections_[i].checkAt("TemplateFileName",
+                                      [&] { readTemplate(config_.parameterFiles[i], config_.parameters); });
+  }
 }
 
 void SetupReader::readInternalConstraints() {
   target_.open("MODEL_PARAMETERS")
       .open("INTERNAL_CONSTRAINTS")
       .readItems("CONSTRAINT_", constraintSection(), config_.constraints,
-                 [](const SetupSection&, const InternalConstraint&) {});
+                 [this](const SetupSection& section, const InternalConstraint& constraint) {
+                   equations_->checkConstraint(constraint, section);
+                 });
 }
 
 void SetupReader::readObjectiveFunctions() {
@@ -208,6 +244,15 @@ void SetupReader::readObjectiveFunctions() {
   if (!config_.task || !config_.task->mayHaveInitialSample()) requireScales(false);
 }
 
+/// Files of series are opened when the whole setup has been read; what is wrong with them is then told with its
+/// location.
+void SetupReader::readReference(const SetupSection& section, const SettingSection<SeriesReference>& keywords,
+                                SeriesReference& reference) {
+  section.read(keywords, reference);
+  reference.fileLocation = section.location("File_Name") + ": File_Name: ";
+  reference.itemLocation = section.location("Item_No") + ": Item_No: ";
+}
+
 void SetupReader::readSeries(const SetupSection& section, OutputMeasure& measure) const {
   const std::int64_t number = std::ssize(config_.measures);
   // A measure that the model writes itself needs no series; its sections are read if present.
@@ -216,7 +261,7 @@ void SetupReader::readSeries(const SetupSection& section, OutputMeasure& measure
     return needsSeries ? std::optional(section.open(name)) : section.openIfPresent(name);
   };
   if (const auto simulated = open("SIMULATION_FILE")) {
-    simulated->read(simulationFileSection(), measure.simulation);
+    readReference(*simulated, simulationFileSection(), measure.simulation);
     if (measure.simulation.fileName.empty() && needsSeries) {
       simulated->refuse(withNumber("Error: No output file defined for output measure No. %", number), "File_Name",
                         "expected the name of a file");
@@ -226,7 +271,7 @@ void SetupReader::readSeries(const SetupSection& section, OutputMeasure& measure
     }
   }
   if (const auto observed = open("OBSERVATION_FILE")) {
-    observed->read(observationFileSection(), measure.observation);
+    readReference(*observed, observationFileSection(), measure.observation);
     if (measure.observation.fileName.empty() && needsSeries) {
       observed->refuse(withNumber("Error: No observation file defined for output measure No. %", number), "File_Name",
                        "expected the name of a file");
@@ -315,7 +360,12 @@ void SetupReader::readMeasureFile() {
 
 RunConfig readSetup(const std::string& fileName, std::string_view text, RunLog& log, bool usesMpiWorkers) {
   const SetupLocation location = locateSetup(fileName);
-  SetupFile file(std::string(trim(fileName)), location.folder, text, setupSchema(), log);
+  const std::string name(trim(fileName));
+  const DecodedText decoded = decodeText(text);
+  if (decoded.encoding != "UTF-8") {
+    log.warning(fmt::format("{}: the text is not UTF-8 and is read as {}", name, decoded.encoding));
+  }
+  SetupFile file(name, location.folder, decoded.text, setupSchema(), log);
   warnAboutUnusedEntries(file);
   return SetupReader(file, location, usesMpiWorkers).read();
 }

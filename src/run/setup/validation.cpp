@@ -28,22 +28,19 @@ SettingRefusal refuseRepeated(std::string_view message, const std::string& name,
 }  // namespace
 
 std::optional<SettingRefusal> validateParameterBounds(const ModelParameter& parameter) {
-  // Checked first, as every initial value is outside such bounds.
+  const bool isBelow = parameter.initialValue < parameter.lowerBound;
+  if (!isBelow && !(parameter.initialValue > parameter.upperBound)) return std::nullopt;
+  std::string explanation =
+      isBelow ? fmt::format("expected {} or more, found {}", parameter.lowerBound, parameter.initialValue)
+              : fmt::format("expected {} or less, found {}", parameter.upperBound, parameter.initialValue);
+  // Every value is outside bounds that are the wrong way round.
   if (parameter.lowerBound > parameter.upperBound) {
-    return SettingRefusal{"Error: Lower bound larger than upper bound for parameter " + parameter.name, "Lower_Bound",
-                          fmt::format("expected {} or less, found {}", parameter.upperBound, parameter.lowerBound)};
+    explanation = fmt::format("Lower_Bound {} is above Upper_Bound {}: are they swapped? The initial value is {}",
+                              parameter.lowerBound, parameter.upperBound, parameter.initialValue);
   }
-  if (parameter.initialValue < parameter.lowerBound) {
-    return SettingRefusal{"Error: Initial parameter value smaller than lower bound for parameter " + parameter.name,
-                          "Initial_Value",
-                          fmt::format("expected {} or more, found {}", parameter.lowerBound, parameter.initialValue)};
-  }
-  if (parameter.initialValue > parameter.upperBound) {
-    return SettingRefusal{"Error: Initial parameter value larger than upper bound for parameter " + parameter.name,
-                          "Initial_Value",
-                          fmt::format("expected {} or less, found {}", parameter.upperBound, parameter.initialValue)};
-  }
-  return std::nullopt;
+  return SettingRefusal{fmt::format("Error: Initial parameter value {} bound for parameter {}",
+                                    isBelow ? "smaller than lower" : "larger than upper", parameter.name),
+                        "Initial_Value", explanation};
 }
 
 std::optional<SettingRefusal> validateParameterDefinition(const ModelParameter& parameter, NamesUsed& names) {
@@ -104,7 +101,9 @@ std::optional<SettingRefusal> validateProcessCount(const RunConfig& config) {
   if (!only) return std::nullopt;
   return SettingRefusal{
       std::string(only->refusal), kSlotsKeyword,
-      fmt::format("expected 1 with this {}, found {}", only->keyword, config.simultaneousSimulations)};
+      fmt::format("expected 1 with this {}, found {}{}{}", only->keyword, config.simultaneousSimulations,
+                  only->atOnceUnderMpi.empty() ? "" : "; a job of several processes (MPI) runs at once: ",
+                  only->atOnceUnderMpi)};
 }
 
 }  // namespace mirevo

@@ -142,7 +142,10 @@ void OptimisationTask::readSurrogate(const TaskReading& reading, const SetupSect
   SurrogateSection filled{surrogate, reading.variableCount};
   control.read(surrogateSection(), filled);
   if (!usesSurrogate()) {
-    section.warn(kSurrogateKeyword, fmt::format("{} uses no surrogate model", method->facts().longName));
+    section.warn(kSurrogateKeyword,
+                 fmt::format("{} uses no surrogate model: the search is the same as with 0, and the settings of the "
+                             "model have no effect",
+                             method->facts().longName));
     return;
   }
   const double available = evaluationsAfter(*method, surrogate.initialGenerations);
@@ -177,7 +180,7 @@ std::vector<std::string> OptimisationTask::summaryLines(std::size_t variableCoun
 std::optional<OneSlotOnly> OptimisationTask::needsOneSlot() const {
   if (method->facts().runsInParallel) return std::nullopt;
   return OneSlotOnly{"Error: Use Population Simplex Evolution algorithm for application with multiple processors",
-                     kAlgorithmKeyword};
+                     kAlgorithmKeyword, method->facts().runsAtOnceUnderMpi};
 }
 
 SearchSummary OptimisationTask::search(const TaskContext& context) const {

@@ -85,8 +85,9 @@ struct TaskReport {
 
 /// Why more than one slot is refused.
 struct OneSlotOnly {
-  std::string_view refusal;  ///< the fixed text
-  std::string_view keyword;  ///< the keyword whose value requires one slot
+  std::string_view refusal;              ///< the fixed text
+  std::string_view keyword;              ///< the keyword whose value requires one slot
+  std::string_view atOnceUnderMpi = {};  ///< what the task runs at once under MPI all the same; empty: nothing
 };
 
 /// A task together with its settings: everything that a setup, a run, a restart or a report asks about it. One class

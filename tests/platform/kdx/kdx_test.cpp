@@ -31,7 +31,9 @@ TEST(Kdx, NamesTheFirstPlaceThatIsWrongAndWhatWasExpected) {
       {"[A]\nx = // 3\n", "2:5: expected a value after '=', found the end of the line"},
       {"[A]\nx = 1,\n2\n", "2:7: expected a value after ',', found the end of the line"},
       {"[A]\nx = 1 2\n", "2:7: expected ',' or the end of the line after a value, found \"2\""},
-      {"[A]\nx = 'a' 'b'\n", "2:9: expected ',' or the end of the line after a value, found \"'b'\""},
+      {"[A]\nx = 'a' 'b'\n",
+       "2:9: expected ',' or the end of the line after a value, found \"'b'\"; write a quote inside a text twice, or "
+       "put the text between quotes of the other kind"},
       {"[A]\nx = hello\n", "2:5: expected a number, a date or a text between quotes, found \"hello\""},
       {"[A]\nx = -inf\n", "2:5: expected a number, a date or a text between quotes, found \"-inf\""},
       {"[A]\nx = 1e999\n", "2:5: expected a number, a date or a text between quotes, found \"1e999\""},

@@ -70,6 +70,7 @@ TEST_F(PosixProcessLauncherTest, EndsAreToldApart) {
   const std::tuple<const char*, unsigned, Kind, int, const char*> cases[] = {
       {"#!/bin/sh\nexit 0\n", 0755, Kind::none, 0, ""},
       {"echo no first line with an interpreter\n", 0755, Kind::none, 0, ""},
+      {"nonesuch\n", 0755, Kind::exitCode, 127, "exited with code 127 (a shell: command not found)"},
       {"echo no run bit; exit 4\n", 0644, Kind::exitCode, 4, "exited with code 4"},
       {"#!/bin/sh\nkill -SEGV $$\n", 0755, Kind::signal, SIGSEGV, "was ended by signal 11 (Segmentation fault)"},
       {"", 0, Kind::couldNotStart, ENOENT, "could not be started: No such file or directory"},

@@ -50,12 +50,16 @@ TEST(CsvTimeSeries, RefusesWithThePlaceAndWhatWasExpected) {
   const std::tuple<std::string, std::string> cases[] = {
       {"", "1" + noHeader},
       {"# only\n", "2" + noHeader},
+      {std::string("t\0i\0,\0", 6), " the file is UTF-16 text; save it as UTF-8"},
       {"time Q\n",
        "1:1: expected a header row with its columns separated by comma, semicolon or tab, found \"time Q\""},
       {"2001-01-31,1\n", "1:1: expected a header row before the first time step, found \"2001-01-31,1\""},
       {"# missing = \ntime,Q\n", "1:12: expected a number after \"# missing =\", found \"\""},
       {"# missing = none\ntime,Q\n", "1:13: expected a number after \"# missing =\", found \"none\""},
       {head + "2001-01-31,1,2\n", "4:1: expected a time later than 2001-01-31 00:00, found 2001-01-31 00:00"},
+      {"d,h,Q\n2001-01-31,0:00,1\n2001-01-31,1:00,2\n",
+       "3:1: expected a time later than 2001-01-31 00:00, found 2001-01-31 00:00; the date and the time of day must be "
+       "in one column, such as 2001-01-31 12:30"},
       {head + "2001-01-30 23:59:59,1,2\n",
        "4:1: expected a time later than 2001-01-31 00:00, found 2001-01-30 23:59:59"},
       {head + "2001-02-29,1,2\n", noTime + "\"2001-02-29\""},
@@ -106,6 +110,12 @@ TEST(CsvTimeSeries, CellsThatAreNoNumbersAreRefused) {
     ASSERT_TRUE(series.parse("s.csv", "time;Q\n2001-01-01;" + std::string(cell) + "\n")) << series.lastError();
     EXPECT_FALSE(series.getData(1)) << cell;
   }
+  CsvTimeSeries hours;
+  ASSERT_TRUE(hours.parse("s.csv", "d,h,Q\n2001-01-01,12:30,1\n"));
+  EXPECT_FALSE(hours.getData(1));
+  EXPECT_THAT(hours.lastError(),
+              EndsWith("found \"12:30\"; the date and the time of day must be in one column, such as "
+                       "2001-01-31 12:30"));
   // Too small for a float is no error: a tiny discharge is a zero.
   for (const char* cell : {"1e-60", "-1e-400"}) {
     CsvTimeSeries series;

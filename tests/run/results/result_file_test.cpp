@@ -138,13 +138,14 @@ TEST(FailedRunFile, AppearsWithTheFirstFailureAndSaysWhatHappened) {
   const std::vector<double> values{0.1, 2.0};
   file.add(values, failure(4));
   EvaluationResult silent = failure(9);
-  silent.failure->lastOutput.clear();
+  silent.failure->lastOutput = {"\xE9t\xC3\xA9"};  // the first in Latin-1
   file.add(values, silent);
   EXPECT_EQ(folder.read("calSimErr.dat"),
             "# Failed evaluations of basin\n"
             "\nEvaluation No. 4 (batch ended with an exit code)\n   run.sh exited with code 3\n   k = 0.1\n   n = 2\n"
             "   Last output:\n   | a\n   | b\n"
-            "\nEvaluation No. 9 (batch ended with an exit code)\n   run.sh exited with code 3\n   k = 0.1\n   n = 2\n");
+            "\nEvaluation No. 9 (batch ended with an exit code)\n   run.sh exited with code 3\n   k = 0.1\n   n = 2\n"
+            "   Last output:\n   | \xEF\xBF\xBDt\xC3\xA9\n");
 }
 
 }  // namespace

@@ -32,6 +32,15 @@ TEST(ResultTable, AFileCutAtAnyByteHoldsItsWholeRowsAndNoOther) {
   }
 }
 
+TEST(ResultTable, HeadingsAreUniqueAndThoseOfEarlierVersionsAreKnown) {
+  const ResultColumns columns{{"flow", "Status"}, {"flow", "flow (2)", "Aggregate"}, {"flow "}};
+  const std::string header =
+      "Evaluation\tStatus\tflow\tStatus (2)\tflow (2)\tflow (2) (2)\tAggregate (2)\tflow (3)\tAggregate";
+  EXPECT_EQ(resultHeader(columns), header);
+  EXPECT_TRUE(hasColumns(header, columns));
+  EXPECT_TRUE(hasColumns("Evaluation\tStatus\tflow\tStatus\tflow\tflow (2)\tAggregate\tflow\tAggregate", columns));
+}
+
 TEST(ResultTable, OtherColumnsAreToldFromNone) {
   const std::tuple<std::string, std::size_t, std::size_t> cases[] = {
       {"Evaluation\tStatus\tX2\tRMSE\tAggregate\n", 1, 0}, {"Evaluation\tStatus\tX1\tAggregate\n", 0, 1}};

@@ -83,10 +83,19 @@ TEST_F(SetupReaderTest, RefusesWhatCannotBeReadAndSaysWhere) {
        " section SIMPARAM in KDX file\nsetup.kdx:2:3: expected section [SIMPARAM] in section MIREVO_SIMULATION_OPTION; "
        "found \"SIMPARAMS\", did you mean \"SIMPARAM\"?"},
       {"TqSEKdxListItemCount = 3 => 4",
-       " section PARAMETER_4 in KDX file\nsetup.kdx:19:3: expected section [PARAMETER_4] in section MODEL_PARAMETERS"},
+       " section PARAMETER_4 in KDX file\nsetup.kdx:19:3: expected section [PARAMETER_4] in section MODEL_PARAMETERS\n"
+       "setup.kdx:20:28: TqSEKdxListItemCount is 4, and there are here: PARAMETER_1, PARAMETER_2, PARAMETER_3"},
       {"[SimultaneousSimulations] => [Simultaneous] & [/SimultaneousSimulations] => [/Simultaneous]",
        " section SimultaneousSimulations in KDX file\nsetup.kdx:1:1: expected section [SimultaneousSimulations] in "
-       "section MIREVO_PARAMETERS"},
+       "section MIREVO_PARAMETERS\nsections to add:\n   in [MIREVO_PARAMETERS]:\n   [SimultaneousSimulations]\n   "
+       "[/SimultaneousSimulations]"},
+      {"[SAVE_OUTPUT_FILES] => [Saved] & [/SAVE_OUTPUT_FILES] => [/Saved] & [STOPPING_CRITERIA] => [Stops] & "
+       "[/STOPPING_CRITERIA] => [/Stops]",
+       " section SAVE_OUTPUT_FILES in KDX file\nsetup.kdx:1:1: expected section [SAVE_OUTPUT_FILES] in section "
+       "MIREVO_PARAMETERS\nsections to add:\n   in [MIREVO_PARAMETERS]:\n   [SAVE_OUTPUT_FILES]\n   "
+       "[/SAVE_OUTPUT_FILES]\n   in [OPTIMISATION_ALGORITHM]:\n   [STOPPING_CRITERIA]\n     Max_No_Evaluations = ...\n "
+       "  "
+       "[/STOPPING_CRITERIA]"},
   };
   for (const auto& [edits, error] : others) EXPECT_EQ(failure(edits), std::string("Error: Unable to open") + error);
   EXPECT_EQ(failure(title(longText.substr(1) + "   ")), "") << "trailing blanks do not count";
@@ -94,6 +103,17 @@ TEST_F(SetupReaderTest, RefusesWhatCannotBeReadAndSaysWhere) {
 }
 
 TEST_F(SetupReaderTest, StopsAtTheFirstInvalidValueBeforeLaterSectionsAreRead) {
+  const std::tuple<const char*, const char*, const char*> ofParameters[] = {
+      {"'Depth + Rate' => 'Depth +'", "Error: Unable to create the expression", "\nsetup.kdx:46:28: "},
+      {"'Depth + Rate' => 'Sum + Rate'", "Illegal relationship between dependent parameters 3 and 3",
+       "\nsetup.kdx:46:28: Parameter_Equation: the equation of \"Sum\" names itself"},
+      {"Parameter_Name = 'Depth' => 'Deep' & 'Depth + Rate' => 'Rate'", "Error: Parameter name Depth in template file",
+       "\nsetup.kdx:15:28: TemplateFileName: model/soil.tpl:2:1: "},
+  };
+  for (const auto& [edits, message, detail] : ofParameters) {
+    EXPECT_THAT(failure(edits + std::string(" & [INTERNAL_CONSTRAINTS] => [X] & [/INTERNAL_CONSTRAINTS] => [/X]")),
+                AllOf(StartsWith(message), HasSubstr(detail)));
+  }
   EXPECT_THAT(
       failure("Aggregation_Method = 0 => 9 & [SAVE_OUTPUT_FILES] => [SAVED] & [/SAVE_OUTPUT_FILES] => [/SAVED]"),
       StartsWith("Error: Objective function aggregation method invalid"));
@@ -101,6 +121,18 @@ TEST_F(SetupReaderTest, StopsAtTheFirstInvalidValueBeforeLaterSectionsAreRead) {
                       "NoSimultaneousSim = 4 => 0"),
               StartsWith("Error: Invalid No. of processes"))
       << "a section that the run does not need may be absent";
+}
+
+TEST_F(SetupReaderTest, ASetupInAnotherEncodingIsReadLikeOneInUtf8) {
+  const std::string text = edited("'Upper catchment   ' => 'Südliches Gebiet'");
+  std::string latin1 = text;
+  latin1.replace(latin1.find("ü"), 2, "\xFC");
+  const std::string utf8Log = logOfText(text);
+  EXPECT_THAT(utf8Log, HasSubstr("  Title = 'Südliches Gebiet'\n"));
+  EXPECT_EQ(logOfText(latin1), "Warning: setup.kdx: the text is not UTF-8 and is read as Latin-1\n" + utf8Log);
+  std::string utf16 = "\xFF\xFE";
+  for (const char c : latin1) (utf16 += c) += '\0';
+  EXPECT_EQ(logOfText(utf16), "Warning: setup.kdx: the text is not UTF-8 and is read as UTF-16\n" + utf8Log);
 }
 
 TEST_F(SetupReaderTest, EchoesEverySectionAndValueInReadingOrder) {
@@ -115,7 +147,7 @@ TEST_F(SetupReaderTest, EchoesEverySectionAndValueInReadingOrder) {
                               "[MIREVO_SIMULATION_OPTION/SIMBATCH]\n"
                               "  TqSEKdxListItemCount = 1\n"
                               "[MIREVO_SIMULATION_OPTION/SIMBATCH/SIMBATCHITEM_1]\n"
-                              "  BatchFileName = 'model/run.sh'\n"
+                              "  BatchFileName = 'model\\run.sh'\n"
                               "  Arguments = '' (default)\n"
                               "[MIREVO_SIMULATION_OPTION/SIMPARAM]\n"));
   EXPECT_THAT(log, HasSubstr("  KeyLine = 'soil'\n  KeyLine = 'depth'\n"));
@@ -142,7 +174,8 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatAreSeldomMeant)
       {"[SCENARIOS] => [Scenario][/Scenario][SCENARIOS]",
        "setup.kdx:103:3: section \"Scenario\" is unknown and not read, did you mean \"SCENARIOS\"?"},
       {"TqSEKdxListItemCount = 3 => 2",
-       "setup.kdx:20:28: TqSEKdxListItemCount: 3 sections PARAMETER_n stand here, those beyond 2 are not read"},
+       "setup.kdx:20:28: TqSEKdxListItemCount: there are 3 sections PARAMETER_n here, those beyond 2 are not read: "
+       "PARAMETER_3\n"},
       {"Function_Name = 'Flow' => ''",
        "setup.kdx:91:16: Name: no output measure has this Function_Name, the objective function is always 0"},
       {"Use_Surrogate_Model = 1 => 2", "setup.kdx:123:27: Use_Surrogate_Model: neither 0 nor 1, no search will be run"},
@@ -240,7 +273,7 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatAreSeldomMeant)
       {"Algorithm_Type = 1 => 0 & Max_No_Evaluations = 500 => 27",
        "Max_No_Evaluations: the initial sample of 28 sets is cut to 27"},
       {"Algorithm_Type = 1 => 2 & Max_No_Evaluations = 500 => 10",
-       "Dynamically Dimensioned Search uses no surrogate model"},
+       "Dynamically Dimensioned Search uses no surrogate model: the search is the same as with 0, "},
   };
   for (const auto& [edits, warning] : cases) {
     const std::string log = logOf(edits);

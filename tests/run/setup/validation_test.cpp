@@ -19,6 +19,7 @@ using ValidationTest = SetupFixture;
 
 TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
   folder_.write("Setup.SH", "#!/bin/sh\n");
+  folder_.write("model/mistyped.tpl", "!\n!Depht!\n");
   // The first line behind "Error: ", whole, and what the lines below it hold.
   const std::tuple<const char*, std::string, const char*> cases[] = {
       // The model and its files
@@ -31,6 +32,8 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
       {"'model\\run.sh' => 'Setup.SH'",
        "Model simulation file and mirevo file are located in the same directory with an identical name",
        "setup.kdx:8:25: BatchFileName: "},
+      {"'model\\run.sh' => 'model\\run.sh'\nArguments='-x \"a b'", "Unable to initialise MirevoSimpleLaunch",
+       "setup.kdx:9:11: Arguments: expected a closing \" for the one at character 4, found"},
       {"TqSEKdxListItemCount = 1 // files => 0", "No model parameter files defined", "setup.kdx:12:30"},
       {"'model/soil.par' => 'soil.par'", "The file soil.par is not located in the base folder ",
        "setup.kdx:14:25: ParamFileName"},
@@ -49,7 +52,16 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
        "setup.kdx:26:23: Initial_Value: expected 412.6 or more, found 412.5"},
       {"Upper_Bound = 900 => 412", "Initial parameter value larger than upper bound for parameter Depth",
        "expected 412 or less, found 412.5"},
-      {"Lower_Bound = 6.5 => 8.0", "Lower bound larger than upper bound for parameter Sum", "setup.kdx:41:21"},
+      {"Lower_Bound = 6.5 => 8.0", "Initial parameter value smaller than lower bound for parameter Sum",
+       "setup.kdx:40:23: Initial_Value: Lower_Bound 8 is above Upper_Bound 7.5: are they swapped? The initial value"},
+      {"Upper_Bound = 900 => 99", "Initial parameter value larger than upper bound for parameter Depth",
+       "Lower_Bound 100 is above Upper_Bound 99"},
+      {"'Depth + Rate' => 'Depth + Rat'", "Unable to create the expression Depth + Rat in equation parser",
+       "setup.kdx:46:28: Parameter_Equation: column 9: "},
+      {"'model/soil.tpl' => 'model/mistyped.tpl'", "Parameter name Depht in template file Depht invalid",
+       "setup.kdx:15:28: TemplateFileName: model/mistyped.tpl:2:1: "},
+      {"Left_Equation = 'Rate' => 'Rate +'", "Invalid equation for internal constraints",
+       "setup.kdx:51:25: Left_Equation: Error: Unable to create the expression Rate + in equation parser"},
       {"'Rate'\n    [/P => 'Depth  '\n    [/P", "Invalid parameter name Depth. Name used more than once.",
        "setup.kdx:37:24"},
       {"Lower_Bound = 100 => 0", "Invalid parameter transformation for parameter Depth",
@@ -112,7 +124,7 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
       {"Algorithm_Type = 1 => 2", "Use Population Simplex Evolution algorithm for application with multiple processors",
        "expected 1 with this Algorithm_Type, found 4"},
       {"Algorithm_Type = 1 => 0", "Use Population Simplex Evolution algorithm for application with multiple processors",
-       ""},
+       "found 4; a job of several processes (MPI) runs at once: one proposal of each complex"},
       // Scale and location that nothing can give
       {"Option = 2 => 3 & Aggregation_Method = 0 => 1",
        "Standard deviation and location not defined for objective function Flow",
