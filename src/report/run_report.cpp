@@ -116,7 +116,11 @@ void ReportBuilder::addRun() {
   run.message = sources_.record.message;
   run.reportMade = dateAndTimeNow();
   const RunRecord& record = sources_.record;
-  for (const std::string& text : record.warnings) note("Warning: " + text);
+  for (const std::string& text : record.warnings) {
+    const std::string warning = "Warning: " + text;
+    const bool isInSummary = std::find(data_.summary.begin(), data_.summary.end(), warning) != data_.summary.end();
+    if (!isInSummary) note(warning);
+  }
   if (const int more = record.warningCount - static_cast<int>(record.warnings.size()); more > 0) {
     note(fmt::format("{} more of {} warnings are in {}.log.", more, record.warningCount, config_.setupName));
   }

@@ -178,6 +178,22 @@ TEST_F(LocalEvaluatorTest, AnotherSetUnderTheSameNumberIsNoReplay) {
                          "though the settings are the same."));
 }
 
+/// Earlier versions had exp(ln 5) where the setup gives 5.
+TEST_F(LocalEvaluatorTest, AGivenLogarithmicValueIsThatOfAnEarlierVersionToo) {
+  const double earlier = std::exp(std::log(5.0));
+  ASSERT_NE(earlier, 5.0);
+  SearchSpace space{.names = {"k"},
+                    .initial = {std::log(5.0)},
+                    .lower = {0.0},
+                    .upper = {3.0},
+                    .transformation = {TransformationType::logarithmic}};
+  space.givenValues[{0, std::log(5.0)}] = 5.0;
+  const ObjectiveAggregator aggregator(description_.objectives, method_);
+  EarlierEvaluations evaluations(space, aggregator, {{1, {{earlier}, {}}}, {2, {{std::nextafter(earlier, 0.0)}, {}}}});
+  EXPECT_TRUE(evaluations.take(1, space.initial));
+  EXPECT_THAT(refusalOf([&] { evaluations.take(2, space.initial); }), HasSubstr("has k = 4.99"));
+}
+
 TEST_F(LocalEvaluatorTest, TheFoldersOfTheFirstFailedRunsAreKept) {
   description_.failedFolderPrefix = folder_ / "run_Failed";
   foldersToKeep_ = 3;

@@ -6,6 +6,7 @@
 #include <gtest/gtest.h>
 
 #include "common/data_table.h"
+#include "common/text.h"
 #include "integration/model_folder.h"
 #include "matchers.h"
 
@@ -184,6 +185,25 @@ TEST(LocalSensitivity, LeavesOutTheSecondOfTwoParametersThatActAsASumAtAnyStep) 
       EXPECT_TRUE(std::isnan(deviations[1])) << format << " " << fraction << " " << deviations[1];
     }
   }
+}
+
+TEST(LocalSensitivity, ItsWarningsAreCountedAndPassedOnLikeAllOthers) {
+  const ModelFolder folder;
+  const std::string setup = folder.writeSetup({.option = 1});
+  folder.editSetup("Lower_Bound = 0.0", "Lower_Bound = 4.0");  // no room for a central step
+  const ProgramResult run = runProgram({setup});
+  ASSERT_EQ(run.exitCode, 0) << run.error;
+  const auto count = [&](const std::string& file, std::string_view what) {
+    std::size_t found = 0;
+    const std::string text = folder.read(file);
+    for (const std::string_view line : splitLines(text)) found += line.starts_with(what) ? 1 : 0;
+    return found;
+  };
+  const std::size_t warnings = count("basin.log", "Warning: ");
+  EXPECT_GT(warnings, 0U);
+  EXPECT_EQ(count("basin._spi_", "MESSAGWarning: "), warnings);
+  EXPECT_EQ(count("basin_Sensitivity_Run.dat", "warning\t"), warnings);
+  EXPECT_THAT(run.error, HasSubstr(fmt::format("{} warning", warnings)));
 }
 
 TEST(Scenarios, OfALogarithmicParameterRunWithTheValuesGiven) {

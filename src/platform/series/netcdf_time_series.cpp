@@ -134,6 +134,8 @@ class Unpacking final {
 
   /// Takes numbers outside `valid_min`, `valid_max` and `valid_range` as missing, too.
   void applyValidRange(int file, int variable) {
+    // Its numbers, limits among them, are meant without a sign, which the file's type does not say.
+    if (equalIgnoringCase(textAttribute(file, variable, "_Unsigned"), "true")) return;
     const Numbers range = numbersAttribute(file, variable, "valid_range");
     if (range.values.size() == 2) {
       addLimit(range.type, range.values[0], true);

@@ -87,7 +87,7 @@ void RunResults::open(const RunConfig& config, std::span<const ObservedSeries> o
     goOn(config, aggregator, log);
   } else {
     if (config.restart != RestartMode::startAfresh)
-      log.line("Restart: there are no earlier results to go on from, the run begins anew");
+      log.line("Restart: there are no earlier results to go on from, the run starts afresh");
     startAfresh(config, log);
   }
 }

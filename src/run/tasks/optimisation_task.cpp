@@ -186,7 +186,7 @@ SearchSummary OptimisationTask::search(const TaskContext& context) const {
   }
   std::optional<ProposalSelector> selector;
   if (usesSurrogate()) problem.selector = &selector.emplace(surrogate, problem.bounds);
-  return method->run(std::move(problem), [&context](std::string_view line) { context.log.line(line); });
+  return method->run(std::move(problem), [&context](std::string_view line) { context.log.reportLine(line); });
 }
 
 TaskOutcome OptimisationTask::run(const TaskContext& context) {
