@@ -16,6 +16,7 @@
 #include "common/fatal_error.h"
 #include "common/file_copy.h"
 #include "common/files.h"
+#include "common/run_files.h"
 #include "common/text.h"
 #include "measures/measure_file.h"
 #include "platform/processes/process_folder.h"
@@ -252,7 +253,7 @@ void ModelRunner::keepFailedFolder(int slot, int number, std::vector<std::string
   std::string reason;
   try {
     makeProcessFolder(folder, kept, processFolderPrefix_);
-    const std::string log = std::string("/") + kBatchLogName;  // not part of the model, so not copied with it
+    const std::string log = std::string("/") + run_files::kBatchLog;  // not part of the model, so not copied with it
     struct stat status {};
     const bool hasLog = ::stat((folder + log).c_str(), &status) == 0 || errno != ENOENT;
     if (!hasLog || copyWhole(folder + log, kept + log, reason)) return;

@@ -105,6 +105,7 @@ void RunDriver::openRun(const std::string& setupFileName) {
                            setup.file, runLock_.holder(), filePrefix_));
   }
   const std::string logFile = runFilePath(filePrefix_, run_files::kLog);
+  requireReplaceable(logFile, run_files::kLog);
   const std::string keptLog = RunLog::isOfRefusedSetup(logFile) ? std::string() : keepEarlierFile(logFile);
   std::string reason;
   if (!state_.log.open(logFile, reason)) fatalError("Error: Unable to open " + logFile, reason);
@@ -158,6 +159,7 @@ void RunDriver::buildModel() {
   aggregator_ = std::make_unique<ObjectiveAggregator>(config_.objectives, config_.aggregationMethod);
   // Before the process folders are made, so that a run that cannot be continued changes nothing.
   results_.emplace(config_, parameters_->searchSpace(), filePrefix_);
+  results_->requireReplaceableFiles(config_);
   if (config_.task) config_.task->continueFrom(results_->earlierSearches());
   launcher_ = std::make_unique<PosixProcessLauncher>();
   signalState.haltProcesses = haltProcessesFromSignal;

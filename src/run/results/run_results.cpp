@@ -92,6 +92,20 @@ void RunResults::open(const RunConfig& config, std::span<const ObservedSeries> o
   }
 }
 
+void RunResults::requireReplaceableFiles(const RunConfig& config) const {
+  if (!config.task) return;
+  std::vector<RunFile> files{names_.results,     names_.restart,          names_.simulatedValues,
+                             names_.record,      names_.failures,         run_files::kSeries,
+                             run_files::kReport, run_files::kSavedFolder, run_files::kOwnFailedRuns};
+  files.insert(files.end(), names_.tables.begin(), names_.tables.end());
+  for (const RunFile& file : files) requireReplaceable(runFilePath(filePrefix_, file), file);
+  requireReplaceable(pathBeside(filePrefix_, run_files::kFailedRuns), run_files::kFailedRuns);
+  if (!config.task->report().hasBands) return;
+  for (int number = 1; number <= static_cast<int>(config.measures.size()); ++number) {
+    requireReplaceable(runFilePath(filePrefix_, run_files::kBand, number), run_files::kBand);
+  }
+}
+
 /// `calSimErr.dat` is one per folder, and runs of several setups may be going on in it.
 void RunResults::lockFailedRuns(RunLog& log) {
   const std::string own = runFilePath(filePrefix_, run_files::kOwnFailedRuns);

@@ -39,6 +39,9 @@ class RunResults final {
   void open(const RunConfig& config, std::span<const ObservedSeries> observed, const ObjectiveAggregator& aggregator,
             RunLog& log);
 
+  /// Throws FatalError if a file or folder that this run would write, rename or remove is not one of a run's.
+  void requireReplaceableFiles(const RunConfig& config) const;
+
   /// Closes what stands beside the table. Throws FatalError when what was written did not all arrive.
   void close();
 
