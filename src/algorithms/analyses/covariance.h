@@ -44,8 +44,8 @@ struct ParameterCovariance {
 };
 
 /// By Cholesky factorisation of the scaled matrix (DPOTRF, DPOTRI). A parameter whose column is zero, has no finite
-/// entry, or is, to within the rounding of the simulated values, a linear combination of the columns before it is left
-/// out, with the reason. A row that lacks a derivative by another parameter is left out.
+/// entry, is mostly rounding of the simulated values, or is, to within this rounding, a linear combination of the
+/// columns before it is left out, with the reason. A row that lacks a derivative by another parameter is left out.
 ParameterCovariance parameterCovariance(const LinearisedModel& model);
 
 /// One parameter on the model scale. The limits are computed on the search scale and transformed back; the standard
