@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <cassert>
-#include <charconv>
 #include <cmath>
 #include <limits>
 #include <numeric>
@@ -294,40 +293,6 @@ std::vector<std::vector<double>> differenceColumns(const PerturbationPlan& plan,
     columns.push_back(std::move(column));
   }
   return columns;
-}
-
-std::vector<double> printedUnits(std::span<const double> values, std::span<const std::vector<double>> others) {
-  constexpr int kSingleDigits = 9;
-  int mostDigits = 0;
-  int lowestPlace = std::numeric_limits<int>::max();
-  bool isSingle = true;
-  const auto take = [&](double value) {
-    if (!std::isfinite(value) || value == 0.0) return;
-    char text[32];
-    const std::string_view shortest(
-        text, std::to_chars(std::begin(text), std::end(text), std::abs(value), std::chars_format::scientific).ptr);
-    const std::size_t mark = shortest.find('e');
-    const int digits = static_cast<int>(mark) - (mark > 1 ? 1 : 0);
-    const int exponent = static_cast<int>(std::floor(std::log10(std::abs(value))));
-    mostDigits = std::max(mostDigits, digits);
-    lowestPlace = std::min(lowestPlace, exponent - digits + 1);
-    isSingle = isSingle && static_cast<double>(static_cast<float>(value)) == value;
-  };
-  std::for_each(values.begin(), values.end(), take);
-  for (const std::vector<double>& more : others) std::for_each(more.begin(), more.end(), take);
-  std::vector<double> units;
-  for (const double value : values) {
-    const double size = std::abs(value);
-    if (mostDigits == 0 || !std::isfinite(value)) {
-      units.push_back(0.0);
-    } else if (isSingle && mostDigits > kSingleDigits) {
-      units.push_back(size * static_cast<double>(std::numeric_limits<float>::epsilon()));
-    } else {
-      const double ofDigits = size > 0.0 ? std::pow(10.0, std::floor(std::log10(size)) - mostDigits + 1) : 0.0;
-      units.push_back(std::max(std::pow(10.0, lowestPlace), ofDigits));
-    }
-  }
-  return units;
 }
 
 std::vector<std::size_t> ranked(std::span<const double> values) {

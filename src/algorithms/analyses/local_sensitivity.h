@@ -101,10 +101,6 @@ LocalSensitivity localSensitivity(const SensitivitySettings& settings, const Sea
 std::vector<std::vector<double>> differenceColumns(const PerturbationPlan& plan,
                                                    std::span<const std::vector<double>> outputs);
 
-/// The unit in which each of these values is printed in its file: that of the last digit that any of them has, or of
-/// the last of the most significant digits, whichever is larger.
-std::vector<double> printedUnits(std::span<const double> values, std::span<const std::vector<double>> others);
-
 /// The linearised model for the covariance matrix, from the simulated values of every set at the observation times
 /// (empty for a failed one); nothing when the base set failed.
 std::optional<LinearisedModel> linearise(const PerturbationPlan& plan,
