@@ -209,14 +209,17 @@ std::vector<double> invertWhatCanBe(const WeightedModel& weighted, std::span<con
   return gram;
 }
 
-/// The factor is that of a mean of residuals that follow one another as in a first-order autoregression.
-std::string lagOneText(double lagOne) {
+/// The factor is that of a mean of residuals that follow one another as in a first-order autoregression. No line for
+/// residuals that are all 0.
+std::vector<std::string> lagOneLines(double lagOne) {
   constexpr double kHardlyAny = 0.1;
-  if (!(lagOne > kHardlyAny) || lagOne >= 1.0) return fmt::format("Lag-1 correlation of the residuals: {:.3f}", lagOne);
-  return fmt::format(
-      "Lag-1 correlation of the residuals: {:.3f}, which makes the standard deviations about {:.1f} times "
-      "too small, and the limits as much too narrow",
-      lagOne, std::sqrt((1.0 + lagOne) / (1.0 - lagOne)));
+  if (!std::isfinite(lagOne)) return {};
+  if (!(lagOne > kHardlyAny) || lagOne >= 1.0)
+    return {fmt::format("Lag-1 correlation of the residuals: {:.3f}", lagOne)};
+  return {
+      fmt::format("Lag-1 correlation of the residuals: {:.3f}, which makes the standard deviations about {:.1f} times "
+                  "too small, and the limits as much too narrow",
+                  lagOne, std::sqrt((1.0 + lagOne) / (1.0 - lagOne)))};
 }
 
 }  // namespace
@@ -291,8 +294,9 @@ std::vector<DataTable> covarianceTables(const ParameterCovariance& covariance, c
       matrixTable(run_files::kCorrelation, "Correlation of the parameters", names, covariance.correlation));
   DataTable& limits = tables.emplace_back();
   limits.file = run_files::kParameterLimits;
-  limits.headLines = {"Estimate, standard deviation and 95 % limits of each parameter, model scale",
-                      lagOneText(covariance.lagOne)};
+  limits.headLines = lagOneLines(covariance.lagOne);
+  limits.headLines.insert(limits.headLines.begin(),
+                          "Estimate, standard deviation and 95 % limits of each parameter, model scale");
   limits.columns = {"Parameter", "Estimate", "StandardDeviation", "Lower95", "Upper95", "LeftOut"};
   const std::vector<ParameterLimits> found = parameterLimits(covariance, space, set);
   for (std::size_t i = 0; i < names.size(); ++i) {
@@ -344,7 +348,7 @@ std::vector<std::string> formatCovariance(const ParameterCovariance& covariance,
         covariance.withoutDerivative));
   }
   lines.push_back(fmt::format("Standard error of a residual: {:.6g}", std::sqrt(covariance.errorVariance)));
-  lines.push_back(lagOneText(covariance.lagOne));
+  for (std::string& line : lagOneLines(covariance.lagOne)) lines.push_back(std::move(line));
 
   std::vector<std::string> names;
   for (const std::size_t j : covariance.kept) names.push_back(space.names[j]);

@@ -20,6 +20,8 @@ struct LinearisedModel {
   /// from both follows how much of a column is rounding. None when empty.
   std::vector<double> units = {};
   std::vector<double> widths = {};
+  /// Which derivatives of each column are one-sided for want of a value, p of n; none when empty.
+  std::vector<std::vector<bool>> oneSided = {};
 };
 
 /// A parameter without a variance, and why.

@@ -97,7 +97,7 @@ LocalSensitivity localSensitivity(const SensitivitySettings& settings, const Sea
 
 /// The derivatives of any outputs by differences: p columns, one row per value; NaN for a parameter with a problem.
 /// `outputs[i]` are the values of set i; those of a failed set may be empty. A value that one side of a central
-/// difference lacks is replaced by that of the base set.
+/// difference lacks is replaced by that of the base set, unless the parameter's values of both are written alike.
 std::vector<std::vector<double>> differenceColumns(const PerturbationPlan& plan,
                                                    std::span<const std::vector<double>> outputs);
 
@@ -109,7 +109,8 @@ std::optional<LinearisedModel> linearise(const PerturbationPlan& plan,
 
 /// Computes the composite scaled sensitivities over the observations and ranks by them: the root mean square of the
 /// derivatives of all simulated values times the extent of the parameter and the root of the weight (Hill and
-/// Tiedeman). Unlike the derivatives of a measure of the error, they do not vanish at an optimum.
+/// Tiedeman). Unlike the derivatives of a measure of the error, they do not vanish at an optimum. The plan says how
+/// many derivatives are one-sided for want of a value.
 void takeObservations(const LinearisedModel& model, LocalSensitivity& sensitivity);
 
 /// The analysis as tables for programs: one row per parameter and output with the derivative, the scaled sensitivity,

@@ -29,8 +29,10 @@ std::vector<double> printedUnits(std::span<const double> values) {
   std::vector<double> units;
   for (const double value : values) {
     const double size = std::abs(value);
-    if (mostDigits == 0 || !std::isfinite(value)) {
+    if (!std::isfinite(value)) {
       units.push_back(std::numeric_limits<double>::quiet_NaN());
+    } else if (mostDigits == 0) {
+      units.push_back(1.0);
     } else {
       const double ofDigits = size > 0.0 ? std::pow(10.0, std::floor(std::log10(size)) - mostDigits + 1) : 0.0;
       units.push_back(std::max(std::pow(10.0, lowestPlace), ofDigits));

@@ -170,6 +170,10 @@ TEST(ParameterCovariance, SaysWhatTheCorrelationOfTheResidualsDoesToIt) {
   EXPECT_THAT(formatCovariance(result, spaceOf({1}), std::vector<double>{1}),
               Contains("Lag-1 correlation of the residuals: 0.500, which makes the standard deviations about 1.7 times "
                        "too small, and the limits as much too narrow"));
+  model.residuals.assign(6, 0.0);
+  const ParameterCovariance perfect = parameterCovariance(model);
+  EXPECT_THAT(formatCovariance(perfect, spaceOf({1}), std::vector<double>{1}), Not(Contains(HasSubstr("Lag-1"))));
+  EXPECT_EQ(covarianceTables(perfect, spaceOf({1}), std::vector<double>{1}).back().headLines.size(), 1U);
 }
 
 TEST(ParameterCovariance, SaysWhenThereIsNothingToEstimateItFrom) {
