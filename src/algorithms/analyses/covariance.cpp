@@ -62,7 +62,8 @@ double lostShare(std::span<const double> column, std::span<const double> units) 
     for (const std::size_t k : {i - 1, i + 1}) {  // of row 0 the former is no row either
       if (k >= units.size()) continue;
       neighbours += 1.0;
-      if (column[i] * column[k] > 0.0) alike += 1.0;
+      // Interpolation spreads a difference of one time step over the two observations beside it.
+      if (column[i] * column[k] > 0.0) alike += std::min(1.0, std::abs(column[k]) / units[k]);
     }
     if (neighbours > 0.0) lost += square * (1.0 - alike / neighbours);
   }

@@ -91,6 +91,12 @@ TEST(ParameterCovariance, TellsRoundingFromAnEffect) {
   EXPECT_THAT(parameterCovariance(model).kept, ElementsAre(0));
   model.widths = {10, 10};
   EXPECT_THAT(parameterCovariance(model).kept, ElementsAre(0, 1));
+  // Single units of the model's steps, and then of several on end, both interpolated.
+  model.residuals.assign(10, 0.1);
+  model.units.assign(10, 1);
+  model.widths = {1, 1};
+  model.jacobian = {{0, 0.3, 0.7, 0, 0, 0, 0.3, 0.7, 0, 0}, {0, 0, 0, 0.3, 1, 1, 1, 1, 0.7, 0}};
+  EXPECT_THAT(parameterCovariance(model).kept, ElementsAre(1));
 }
 
 /// Central differences, a fraction of the value, of a model that prints 300 values with so many decimals.
