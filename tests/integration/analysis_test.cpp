@@ -75,6 +75,28 @@ TEST(LocalSensitivity, OfALinearModelGivesTheCovarianceOfItsClosedForm) {
   EXPECT_THAT(folder.read("basin.log"), HasSubstr("\nParameter covariance: 365 observations, 2 parameters, 363 "));
 }
 
+// Interpolated values have all digits, however coarse those that the model prints.
+TEST(LocalSensitivity, KnowsTheRoundingOfValuesBetweenTheObservations) {
+  const ModelFolder folder;
+  std::string observed = "time,observed\n";
+  std::string times;
+  for (int day = 1; day <= 336; ++day) {
+    const std::string date = fmt::format("2001-{:02}-{:02}", (day - 1) / 28 + 1, (day - 1) % 28 + 1);
+    observed += fmt::format("{} 07:00,{}\n", date, day % 7);
+    times += date + "\n";
+  }
+  folder.write("observed.csv", observed);
+  folder.write("model/times.txt", times);
+  folder.write("model/run.sh",
+               "#!/bin/sh\nawk '/^[ab] =/ { sum += $3 } END { print \"time,simulated\"\n"
+               "  while ((getline day <\"times.txt\") > 0) printf \"%s,%.3f\\n\", day, 3 + sum * sin(++n / 7) }' "
+               "parameters.txt >simulated.csv\n",
+               0755);
+  ASSERT_EQ(runProgram({folder.writeSetup({.option = 1})}).exitCode, 0);
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("Parameter b is left out of the covariance matrix: its effect cannot "
+                                                  "be told from that of the parameters before it"));
+}
+
 /// A regression problem with certified results.
 struct CertifiedProblem {
   const char* formula;                                    ///< of b[1], b[2], ... and x, for awk

@@ -79,9 +79,8 @@ void RunResults::open(const RunConfig& config, std::span<const ObservedSeries> o
   if (!config.task) return;
   lockFailedRuns(log);
   if (config.keepsSimulatedValues()) {
-    std::size_t count = 0;
-    for (const ObservedSeries& series : observed) count += series.values.size();
-    simulatedValues_.emplace(files_.simulatedValues, count);
+    const SeriesPrecision precision = config.task->keptPrecision();
+    simulatedValues_.emplace(files_.simulatedValues, simulatedValueCount(observed, precision), precision);
   }
   if (earlierRun_) {
     goOn(config, aggregator, log);
@@ -178,6 +177,7 @@ void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggreg
   for (const FailureRow& row : earlier.rows) failures[row.number] = row.failure;
   std::optional<std::map<int, std::vector<double>>> values;
   if (simulatedValues_) values = simulatedValues_->takeUp(succeeded);
+  const std::size_t withoutValues = values ? succeeded.size() - values->size() : 0;
   auto records = earlierRecords(run, failures, std::move(values));
 
   RunRecord record = recordOf(config, log);
@@ -196,6 +196,12 @@ void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggreg
   if (earlier.unknown > 0) {
     log.line(fmt::format("Restart: why evaluations failed is not known any more of {}: {} does not say it",
                          earlier.unknown, files_.failures));
+  }
+  if (withoutValues > 0) {
+    log.line(
+        fmt::format("Restart: {} evaluations are made again: {} does not hold their simulated values, or, as one of "
+                    "an earlier version, not with all digits",
+                    withoutValues, files_.simulatedValues));
   }
   log.line(fmt::format("Restart: {} evaluations are taken from {}", records.size(), files_.results));
   earlierEvaluations_.emplace(space_, aggregator, std::move(records));

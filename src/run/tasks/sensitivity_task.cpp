@@ -69,7 +69,8 @@ ComparedValues compareSeries(const TaskContext& context, std::span<const Evaluat
   std::vector<std::size_t> taken;
   std::size_t first = 0;
   for (const ObservedSeries& series : context.observedSeries) {
-    const std::size_t begin = std::exchange(first, first + series.values.size());
+    const std::size_t count = series.values.size();
+    const std::size_t begin = std::exchange(first, first + 2 * count);  // values, then their units
     const bool counts =
         std::any_of(context.objectives.begin(), context.objectives.end(), [&](const ObjectiveFunction& objective) {
           return std::count(objective.measures.begin(), objective.measures.end(), series.measure) > 0;
@@ -79,20 +80,18 @@ ComparedValues compareSeries(const TaskContext& context, std::span<const Evaluat
                                         [&](std::size_t other) { return isSamePair(measure, measures[other]); });
     if (!counts || isRepeated) continue;
     taken.push_back(series.measure);
-    std::vector<std::vector<double>> runs;
+    // The run that shows most digits tells the unit: in another one all values may end with zeros.
+    std::vector<double> units(count, std::numeric_limits<double>::quiet_NaN());
     for (std::size_t i = 0; i < results.size(); ++i) {
       if (!results[i].ok()) continue;
-      const auto from = results[i].simulatedValues.begin() + static_cast<std::ptrdiff_t>(begin);
-      runs.emplace_back(from, from + static_cast<std::ptrdiff_t>(series.values.size()));
-      compared.simulated[i].insert(compared.simulated[i].end(), runs.back().begin(), runs.back().end());
+      const std::span<const double> kept = std::span(results[i].simulatedValues).subspan(begin, 2 * count);
+      compared.simulated[i].insert(compared.simulated[i].end(), kept.begin(), kept.begin() + count);
+      for (std::size_t t = 0; t < count; ++t) units[t] = std::fmin(units[t], kept[count + t]);
     }
-    compared.series.insert(compared.series.end(), series.values.size(), series.measure);
-    if (!runs.empty()) {
-      const std::vector<double> units = printedUnits(runs.front(), runs);
-      compared.units.insert(compared.units.end(), units.begin(), units.end());
-    }
+    for (const double unit : units) compared.units.push_back(std::isnan(unit) ? 0.0 : unit);
+    compared.series.insert(compared.series.end(), count, series.measure);
     const std::int64_t origin = secondNumber(series.start);
-    for (std::size_t t = 0; t < series.values.size(); ++t) {
+    for (std::size_t t = 0; t < count; ++t) {
       const bool isAbove = results.front().ok() && results.front().simulatedValues[begin + t] > series.values[t];
       const double weight = isAbove ? measure.weightAbove : measure.weight;
       compared.observed.push_back(weight == 0.0 ? std::numeric_limits<double>::quiet_NaN() : series.values[t]);
