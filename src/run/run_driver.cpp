@@ -146,6 +146,9 @@ void RunDriver::buildModel() {
 void RunDriver::logSetup() {
   state_.log.line("");
   state_.log.line(setupSummary(config_, parameters_->searchSpace(), parameters_->evaluationOrder()));
+  if (config_.task) {
+    for (const std::string& text : config_.task->warnings(parameters_->searchSpace())) state_.log.warning(text);
+  }
   for (const std::string& text : unusedParameterWarnings(config_.parameters, runner_->templates())) {
     state_.log.warning(text);
   }

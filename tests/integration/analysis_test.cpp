@@ -115,5 +115,48 @@ TEST(Uncertainty, SummaryAndBandAreThoseOfTheSample) {
                                               HasSubstr("\n400 model evaluations, 3 of them failed\n")));
 }
 
+TEST(Uncertainty, TheLogTellsTheDistributionOfEachParameterAndWarnsOfWhatIsHardlyMeant) {
+  const ModelFolder folder;
+  const std::string setup = folder.writeSetup({.option = 3});
+  folder.editSetup("Lower_Bound = 0.0\n      Upper_Bound = 10.0\n      Transformation_Type = 0",
+                   "Lower_Bound = 4.0\n      Upper_Bound = 6.0\n      Transformation_Type = 1");
+  folder.editSetup("Upper_Bound = 5.0\n      Transformation_Type = 0",
+                   "Upper_Bound = 2.0\n      Transformation_Type = 2");
+  folder.editSetup("Standard_Deviation = 0.1\n    [/PARAMETER_2]",
+                   "Standard_Deviation = 0.75\n    [/PARAMETER_2]\n    [PARAMETER_3]\n    [/PARAMETER_3]");
+  ASSERT_EQ(runProgram({setup}).exitCode, 0);
+  const std::string log = folder.read("basin.log");
+  EXPECT_THAT(log,
+              HasSubstr("\n  PARAMETER_1: a, mean 5, standard deviation 0.5 of the natural logarithm; on the model "
+                        "scale median 148.413, 5 to 95 % from 65.2074 to 337.791\n"
+                        "  PARAMETER_2: b, mean 2, standard deviation 0.75; on the model scale 5 to 95 % from 0 to "
+                        "3\n    an integer: values drawn from 2 to below 3 become 2, so that half of the values are "
+                        "below 2; the mean to give for values around 2 is 2.5\n"));
+  EXPECT_THAT(log, HasSubstr("Warning: Mean_Value of PARAMETER_1 (a) is 5, on the model scale 148.413: outside the "
+                             "bounds 4 to 6; the mean of a logarithmic parameter is that of its natural logarithm, "
+                             "ln(5) = 1.60944\n"));
+  EXPECT_THAT(log, Not(HasSubstr("Mean_Value of PARAMETER_2")));
+  EXPECT_THAT(log, HasSubstr("PARAMETER_3: not read: PARAMETER_n is the distribution of the n-th of the 2 variable "));
+
+  folder.editSetup("Mean_Value = 5.0", "Mean_Value = 1.6");
+  ASSERT_EQ(runProgram({setup}).exitCode, 0);
+  std::size_t ofA = 0;
+  std::size_t ofB = 0;
+  std::size_t ofSets = 0;
+  const std::string results = folder.read("basin.dat");
+  for (const auto& row : readDataTable(results).rows) {
+    const double a = *realCell(row[2]);
+    const double b = *realCell(row[3]);
+    ofA += a < 4.0 || a > 6.0 ? 1 : 0;
+    ofB += b < 0.0 || b > 2.0 ? 1 : 0;
+    ofSets += a < 4.0 || a > 6.0 || b < 0.0 || b > 2.0 ? 1 : 0;
+  }
+  ASSERT_GT(std::min(ofA, ofB), 0U);
+  const std::string line =
+      fmt::format("Sets outside the bounds of a parameter: {} of 40 (a in {}, b in {})\n", ofSets, ofA, ofB);
+  EXPECT_THAT(results, HasSubstr("\n# " + line));
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("\n" + line));
+}
+
 }  // namespace
 }  // namespace mirevo::testing

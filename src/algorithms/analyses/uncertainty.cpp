@@ -116,9 +116,11 @@ std::vector<ParameterSet> uncertaintySample(const UncertaintySettings& settings,
 }
 
 UncertaintyOutcome uncertaintyAnalysis(const UncertaintySettings& settings, std::int32_t seed, Evaluator& evaluator,
-                                       const MessageSink& messages) {
+                                       const MessageSink& messages,
+                                       const std::function<void(std::span<const ParameterSet>)>& drawn) {
   UncertaintyOutcome outcome;
   if (!settings.parameters.empty()) outcome.sample = uncertaintySample(settings, seed, messages);
+  if (drawn) drawn(outcome.sample);
   outcome.results = evaluator.evaluateParameterSets(outcome.sample, DispatchMode::task);
   return outcome;
 }

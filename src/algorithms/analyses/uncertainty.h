@@ -1,6 +1,8 @@
 #pragma once
 
 #include <cstdint>
+#include <functional>
+#include <span>
 #include <string>
 #include <vector>
 
@@ -50,9 +52,10 @@ struct UncertaintyOutcome {
 
 /// Draws the sample and evaluates it in one batch (an empty one where there is no variable parameter). The scale of the
 /// objective functions is not taken from the sample: no aggregate is used here, and a constant objective function must
-/// not end the analysis.
+/// not end the analysis. `drawn` receives the sample before it is evaluated.
 UncertaintyOutcome uncertaintyAnalysis(const UncertaintySettings& settings, std::int32_t seed, Evaluator& evaluator,
-                                       const MessageSink& messages = {});
+                                       const MessageSink& messages = {},
+                                       const std::function<void(std::span<const ParameterSet>)>& drawn = {});
 
 /// Names of what an analysis reports, for its tables; each list in setup order.
 struct AnalysisNames {

@@ -107,7 +107,9 @@ class Task {
   /// "Parameter optimisation: Dynamically Dimensioned Search"
   virtual std::string description() const = 0;
   /// Further lines for the summary of the setup.
-  virtual std::vector<std::string> summaryLines(std::size_t variableCount) const;
+  virtual std::vector<std::string> summaryLines(const SearchSpace& space) const;
+  /// Warnings for the log about settings that work but may not be meant.
+  virtual std::vector<std::string> warnings(const SearchSpace& /*space*/) const { return {}; }
 
   /// Number of planned evaluations, on which the failed-run limit is based.
   virtual int plannedEvaluations(std::size_t variableCount) const = 0;

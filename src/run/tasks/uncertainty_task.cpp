@@ -2,6 +2,7 @@
 
 #include <fmt/format.h>
 
+#include "algorithms/analyses/sampled_distributions.h"
 #include "algorithms/analyses/series_band.h"
 #include "run/tasks/analysis_names.h"
 
@@ -43,6 +44,13 @@ void UncertaintyTask::read(const TaskReading& reading) {
   const SetupSection section = reading.target.open("UNCERTAINTY_ESTIMATION");
   UncertaintySection filled{settings, randomSeed};
   section.read(uncertaintySection(), filled);
+  if (const auto surplus = section.itemBeyond("PARAMETER_", reading.variableCount)) {
+    surplus->warn(surplus->name(),
+                  fmt::format("not read: PARAMETER_n is the distribution of the n-th of the {} variable parameters. "
+                              "If the sections are numbered by model parameter, each one that comes after a fixed or "
+                              "dependent parameter is taken for another parameter's",
+                              reading.variableCount));
+  }
   for (std::size_t i = 0; i < reading.variableCount; ++i) {
     const SetupSection item = section.openItem("PARAMETER_", i + 1);
     item.read(distributionSection(), settings.parameters.emplace_back());
@@ -54,9 +62,18 @@ std::string UncertaintyTask::description() const {
                      kSamplingTypeNames[settings.samplingType == SamplingType::latinHypercube ? 1 : 0].name);
 }
 
+std::vector<std::string> UncertaintyTask::summaryLines(const SearchSpace& space) const {
+  return distributionLines(settings, space);
+}
+
+std::vector<std::string> UncertaintyTask::warnings(const SearchSpace& space) const {
+  return distributionWarnings(settings, space);
+}
+
 TaskOutcome UncertaintyTask::run(const TaskContext& context) {
-  const UncertaintyOutcome found = uncertaintyAnalysis(settings, randomSeed, context.evaluator,
-                                                       [&](std::string_view text) { context.log.line(text); });
+  const UncertaintyOutcome found = uncertaintyAnalysis(
+      settings, randomSeed, context.evaluator, [&](std::string_view text) { context.log.line(text); },
+      [&](std::span<const ParameterSet> sample) { context.log.line(setsOutsideBounds(sample, context.space)); });
   TaskOutcome outcome{std::string(kEndOfTask)};
   const UncertaintySummary summary = summariseUncertainty(found);
   const AnalysisNames names = analysisNames(context);
@@ -65,6 +82,7 @@ TaskOutcome UncertaintyTask::run(const TaskContext& context) {
   logReport(context, outcome.report);
   const std::vector<std::string> bands = reportBands(context, found.results, outcome.files);
   logReport(context, bands);
+  outcome.report.insert(outcome.report.begin() + 1, setsOutsideBounds(found.sample, context.space));  // logged before
   outcome.report.emplace_back();
   outcome.report.insert(outcome.report.end(), bands.begin(), bands.end());
   return outcome;
