@@ -158,5 +158,72 @@ TEST(Uncertainty, TheLogTellsTheDistributionOfEachParameterAndWarnsOfWhatIsHardl
   EXPECT_THAT(folder.read("basin.log"), HasSubstr("\n" + line));
 }
 
+TEST(Uncertainty, ReportsWhatTheModelGotAndALargeTableOfCorrelationsOnce) {
+  const ModelFolder folder;
+  const std::string setup = folder.writeSetup({.option = 3});
+  folder.editSetup("Lower_Bound = 0.0\n      Upper_Bound = 10.0\n      Transformation_Type = 0",
+                   "Lower_Bound = 0.1\n      Upper_Bound = 10.0\n      Transformation_Type = 1");
+  folder.editSetup("Upper_Bound = 5.0\n      Transformation_Type = 0",
+                   "Upper_Bound = 5.0\n      Transformation_Type = 2");
+  folder.editSetup("Mean_Value = 5.0", "Mean_Value = 1.5");
+  folder.editSetup("Standard_Deviation = 0.1", "Standard_Deviation = 0.8");
+  ASSERT_EQ(runProgram({setup}).exitCode, 0);
+  const auto rows = readDataTable(folder.read("basin.dat")).rows;
+  double sumA = 0.0;
+  double sumB = 0.0;
+  double sumAA = 0.0;
+  double sumBB = 0.0;
+  double sumAB = 0.0;
+  for (const auto& row : rows) {
+    const double a = *realCell(row[2]);
+    const double b = *realCell(row[3]);
+    sumA += a;
+    sumB += b;
+    sumAA += a * a;
+    sumBB += b * b;
+    sumAB += a * b;
+  }
+  const std::string quantiles = folder.read("basin_Quantiles.dat");
+  EXPECT_NEAR(cellOf(quantiles, {"parameter", "a"}, "Mean"), sumA / 40.0, 1e-12);
+  EXPECT_NEAR(cellOf(quantiles, {"parameter", "b"}, "Mean"), sumB / 40.0, 1e-12);
+  EXPECT_EQ(cellOf(quantiles, {"parameter", "b"}, "95 %"), 3.0) << "a step of the integer's grid";
+  EXPECT_NEAR(cellOf(folder.read("basin_SampleCorrelation.dat"), {"a"}, "b"),
+              (40.0 * sumAB - sumA * sumB) / std::sqrt((40.0 * sumAA - sumA * sumA) * (40.0 * sumBB - sumB * sumB)),
+              1e-9);
+  const std::string table = "\n#    Sample correlation              a              b\n";
+  EXPECT_THAT(folder.read("basin.dat"), HasSubstr(table));
+
+  std::string parameters;
+  std::string distributions;
+  for (int i = 3; i <= 11; ++i) {
+    parameters += fmt::format(
+        "[PARAMETER_{0}]\n Initial_Value = 1\n Lower_Bound = 0\n Upper_Bound = 2\n Transformation_Type = 0\n "
+        "Parameter_Type = 0\n Parameter_Name = 'p{0}'\n Parameter_IDValue = 0\n[/PARAMETER_{0}]\n",
+        i + 1);
+    distributions += fmt::format("[PARAMETER_{0}]\nMean_Value = 1\nStandard_Deviation = 1\n[/PARAMETER_{0}]\n", i);
+  }
+  folder.editSetup("[MODEL_PARAMETERS]\n    TqSEKdxListItemCount = 3",
+                   "[MODEL_PARAMETERS]\n    TqSEKdxListItemCount = 12\n" + parameters);
+  folder.editSetup("[/UNCERTAINTY_ESTIMATION]", distributions + "[/UNCERTAINTY_ESTIMATION]");
+  const ProgramResult run = runProgram({setup});
+  ASSERT_EQ(run.exitCode, 0) << run.error;
+  const auto correlations = readDataTable(folder.read("basin_SampleCorrelation.dat")).rows;
+  ASSERT_EQ(correlations.size(), 11U);
+  std::pair<double, std::string> largest;
+  for (std::size_t i = 0; i < 11; ++i) {
+    for (std::size_t j = i + 1; j < 11; ++j) {
+      const double value = *realCell(correlations[i][j + 1]);
+      largest = std::max(largest, {std::abs(value), fmt::format("{}, {} ", correlations[i][0], correlations[j][0])});
+    }
+  }
+  for (const char* file : {"basin.dat", "basin.log"}) {
+    const std::string text = folder.read(file);
+    const std::string heading = text.substr(std::min(text.size(), text.find("Sample correlation        Largest\n")));
+    EXPECT_THAT(heading.substr(heading.find('\n') + 1), ::testing::ContainsRegex("^#? *" + largest.second));
+    EXPECT_THAT(heading, HasSubstr("All correlations of the 11 parameters are in basin_SampleCorrelation.dat\n"));
+    EXPECT_THAT(text, Not(HasSubstr(table))) << file;
+  }
+}
+
 }  // namespace
 }  // namespace mirevo::testing

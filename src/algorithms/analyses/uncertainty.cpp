@@ -125,7 +125,9 @@ UncertaintyOutcome uncertaintyAnalysis(const UncertaintySettings& settings, std:
   return outcome;
 }
 
-UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome) {
+UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome, const SearchSpace& space) {
+  std::vector<std::vector<double>> modelValues;
+  for (const ParameterSet& set : outcome.sample) modelValues.push_back(ToModelScale(space, set));
   std::vector<const EvaluationResult*> successful;
   for (const EvaluationResult& result : outcome.results) {
     if (result.ok()) successful.push_back(&result);
@@ -134,8 +136,8 @@ UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome) {
   summary.evaluationCount = outcome.results.size();
   summary.failedCount = outcome.results.size() - successful.size();
   summary.parameters = summariseColumns(
-      outcome.sample.size(), [&](std::size_t i) -> auto& { return outcome.sample[i]; });
-  summary.correlations = correlationMatrix(outcome.sample);
+      modelValues.size(), [&](std::size_t i) -> auto& { return modelValues[i]; });
+  summary.correlations = correlationMatrix(modelValues);
   summary.measures = summariseColumns(
       successful.size(), [&](std::size_t i) -> auto& { return successful[i]->measureValues; });
   summary.objectives = summariseColumns(
@@ -147,7 +149,7 @@ std::vector<DataTable> uncertaintyTables(const UncertaintySummary& summary, cons
   DataTable table;
   table.file = run_files::kQuantiles;
   table.headLines = {
-      "Parameters on the search scale, of all sets drawn; measures and objective functions of those whose "
+      "Parameters on the model scale, of all sets drawn; measures and objective functions of those whose "
       "model run succeeded"};
   table.columns = {"Kind", "Name", "Count", "Mean", "StandardDeviation"};
   for (const double p : kSummaryProbabilities) table.columns.push_back(fmt::format("{:g} %", 100.0 * p));
@@ -164,20 +166,21 @@ std::vector<DataTable> uncertaintyTables(const UncertaintySummary& summary, cons
   add("measure", names.measures, summary.measures);
   add("objective", names.objectives, summary.objectives);
   return {std::move(table),
-          matrixTable(run_files::kSampleCorrelation, "Correlation of the parameters of all sets drawn",
+          matrixTable(run_files::kSampleCorrelation, "Correlation of the parameters of all sets drawn, model scale",
                       names.parameters, summary.correlations)};
 }
 
-std::vector<std::string> formatUncertainty(const UncertaintySummary& summary, const AnalysisNames& names) {
+std::vector<std::string> formatUncertainty(const UncertaintySummary& summary, const AnalysisNames& names,
+                                           std::string_view correlationFile) {
   std::vector<std::string> lines;
   lines.push_back(fmt::format("Uncertainty analysis: {} evaluations, {} failed and left out of the statistics",
                               summary.evaluationCount, summary.failedCount));
-  appendSummaries(lines, "Parameter (search scale)", names.parameters, summary.parameters);
+  appendSummaries(lines, "Parameter (model scale)", names.parameters, summary.parameters);
   appendSummaries(lines, "Output measure", names.measures, summary.measures);
   appendSummaries(lines, "Objective function", names.objectives, summary.objectives);
   lines.emplace_back();
   for (std::string& line :
-       formatTable("Sample correlation", names.parameters, names.parameters, summary.correlations)) {
+       formatCorrelation("Sample correlation", names.parameters, summary.correlations, correlationFile)) {
     lines.push_back(std::move(line));
   }
   return lines;

@@ -75,9 +75,10 @@ TaskOutcome UncertaintyTask::run(const TaskContext& context) {
       settings, randomSeed, context.evaluator, [&](std::string_view text) { context.log.line(text); },
       [&](std::span<const ParameterSet> sample) { context.log.line(setsOutsideBounds(sample, context.space)); });
   TaskOutcome outcome{std::string(kEndOfTask)};
-  const UncertaintySummary summary = summariseUncertainty(found);
+  const UncertaintySummary summary = summariseUncertainty(found, context.space);
   const AnalysisNames names = analysisNames(context);
-  outcome.report = formatUncertainty(summary, names);
+  outcome.report =
+      formatUncertainty(summary, names, fileNameOf(runFilePath(context.filePrefix, run_files::kSampleCorrelation)));
   outcome.tables = uncertaintyTables(summary, names);
   logReport(context, outcome.report);
   const std::vector<std::string> bands = reportBands(context, found.results, outcome.files);
