@@ -235,11 +235,17 @@ void ReportBuilder::addSeries() {
 
 void ReportBuilder::addAnalyses() {
   const bool isFinished = sources_.stage == RunStage::finished;
+  const auto& analysed = sources_.record.analysed;
+  const bool hasAnalysis = isFinished || analysed;
   const TaskReport task = config_.task->report();
-  if (task.hasBands && isFinished) data_.bands = reportedBands(config_, filePrefix_);
+  if (analysed) {
+    note(fmt::format("The statistics are those of an unfinished run: of {} of {} evaluations.", *analysed,
+                     config_.plannedEvaluations()));
+  }
+  if (task.hasBands && hasAnalysis) data_.bands = reportedBands(config_, filePrefix_);
   if (task.sensitivity == nullptr) return;
   data_.sensitivity = reportedSensitivity(config_, *task.sensitivity, space(), sources_.results.rows);
-  if (!data_.sensitivity || !isFinished) return;
+  if (!data_.sensitivity || !hasAnalysis) return;
   std::string fault;
   data_.sensitivity->covariance = reportedCovariance(filePrefix_, fault);
   if (!fault.empty()) note(fmt::format("The covariance is not shown: {}.", fault));

@@ -225,5 +225,72 @@ TEST(Uncertainty, ReportsWhatTheModelGotAndALargeTableOfCorrelationsOnce) {
   }
 }
 
+/// What an analysis that did not come to its end says it is of.
+void expectMarked(const ModelFolder& folder, const std::string& results, const std::vector<std::string>& tables,
+                  const std::string& ofHowMany) {
+  const std::string mark = "Unfinished run: statistics of " + ofHowMany + " evaluations\n";
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("\n" + mark));
+  EXPECT_THAT(folder.read(results), HasSubstr("\n# " + mark));
+  for (const std::string& table : tables) EXPECT_THAT("\n" + folder.read(table), HasSubstr("\n# " + mark)) << table;
+  if (folder.exists("basin_Report.html")) {  // not in a build without its page
+    EXPECT_THAT(folder.read("basin_Report.html"),
+                HasSubstr("The statistics are those of an unfinished run: of " + ofHowMany + " evaluations."));
+  }
+}
+
+TEST(UnfinishedAnalysis, AnUncertaintyAnalysisHasTheStatisticsOfWhatSucceededUntilItGoesOn) {
+  const ModelFolder folder;
+  folder.useScript("test -e '" + folder / "sound" + "' || set -- --fail-above 5.3");
+  const std::vector<std::string> files = {"basin_Quantiles.dat", "basin_SampleCorrelation.dat", "basin_Band_1.csv"};
+  const std::string setup = folder.writeSetup({.option = 3, .restart = 2});
+  EXPECT_EQ(runProgram({setup}).exitCode, 1);
+  const auto rows = readDataTable(folder.read("basin.dat")).rows;
+  double sum = 0.0;
+  int count = 0;
+  for (const auto& row : rows) {
+    if (row[1] != "OK") continue;
+    sum += *realCell(row[4]);
+    ++count;
+  }
+  ASSERT_EQ(rows.size(), static_cast<std::size_t>(count) + 5) << "a tenth of 40 may fail";
+  expectMarked(folder, "basin.dat", files, fmt::format("{} of 40", count));
+  const std::string quantiles = folder.read(files[0]);
+  EXPECT_EQ(cellOf(quantiles, {"measure", "flow"}, "Count"), count);
+  EXPECT_NEAR(cellOf(quantiles, {"measure", "flow"}, "Mean"), sum / count, 1e-9);
+  EXPECT_EQ(cellOf(quantiles, {"parameter", "a"}, "Count"), rows.size());
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("failed model runs are described in calSimErr.dat\n"));
+  EXPECT_THAT(folder.read("basin_Run.dat"), HasSubstr(fmt::format("\nanalysedEvaluations\t{}\n", count)));
+
+  folder.write("sound", "");
+  const ProgramResult goneOn = runProgram({setup});
+  EXPECT_EQ(goneOn.exitCode, 0) << goneOn.error;
+  EXPECT_EQ(cellOf(folder.read(files[0]), {"measure", "flow"}, "Count"), 36) << "four failures came before a success";
+  for (const std::string& file : files) EXPECT_THAT(folder.read(file), Not(HasSubstr("Unfinished"))) << file;
+  EXPECT_FALSE(folder.exists("basin_Quantiles.1.dat"));
+  EXPECT_FALSE(folder.exists("basin_Band_1.1.csv"));
+}
+
+TEST(UnfinishedAnalysis, ASensitivityAnalysisHasTheDerivativesThatItKnows) {
+  const ModelFolder folder;
+  folder.useScript("if grep -q '^b = *1.00[1-9]' parameters.txt; then exit 3; fi");  // the last of five sets
+  EXPECT_EQ(runProgram({folder.writeSetup({.option = 1})}).exitCode, 1);
+  expectMarked(folder, "basin_Sensitivity.dat", {"basin_Sensitivities.dat", "basin_ParameterLimits.dat"}, "4 of 5");
+  const std::string table = folder.read("basin_Sensitivities.dat");
+  EXPECT_NEAR(cellOf(table, {"a", "measure", "flow"}, "Derivative"), -0.816676, 1e-5);
+  EXPECT_TRUE(std::isnan(cellOf(table, {"b", "measure", "flow"}, "Derivative")));
+}
+
+TEST(UnfinishedAnalysis, OneThatIsCancelledHasStatisticsAndItsLogStillEndsWithTheReason) {
+  const ModelFolder folder;
+  folder.useScript("sleep 0.1");
+  RunningProgram program({folder.writeSetup({.option = 3})});
+  EXPECT_TRUE(folder.reaches("basin.log", "No. 3 completed: OK"));
+  folder.write("basin._kill_", "");
+  EXPECT_EQ(program.wait().exitCode, 1);
+  const auto count = readDataTable(folder.read("basin.dat")).rows.size();
+  expectMarked(folder, "basin.dat", {"basin_Quantiles.dat", "basin_Band_1.csv"}, fmt::format("{} of 40", count));
+  EXPECT_THAT(folder.read("basin.log"), EndsWith("\n\nSimulation cancelled\n"));
+}
+
 }  // namespace
 }  // namespace mirevo::testing

@@ -149,7 +149,7 @@ std::vector<DataTable> uncertaintyTables(const UncertaintySummary& summary, cons
   DataTable table;
   table.file = run_files::kQuantiles;
   table.headLines = {
-      "Parameters on the model scale, of all sets drawn; measures and objective functions of those whose "
+      "Parameters on the model scale, of all sets evaluated; measures and objective functions of those whose "
       "model run succeeded"};
   table.columns = {"Kind", "Name", "Count", "Mean", "StandardDeviation"};
   for (const double p : kSummaryProbabilities) table.columns.push_back(fmt::format("{:g} %", 100.0 * p));
@@ -166,7 +166,7 @@ std::vector<DataTable> uncertaintyTables(const UncertaintySummary& summary, cons
   add("measure", names.measures, summary.measures);
   add("objective", names.objectives, summary.objectives);
   return {std::move(table),
-          matrixTable(run_files::kSampleCorrelation, "Correlation of the parameters of all sets drawn, model scale",
+          matrixTable(run_files::kSampleCorrelation, "Correlation of the parameters of all sets evaluated, model scale",
                       names.parameters, summary.correlations)};
 }
 

@@ -69,7 +69,7 @@ struct AnalysisNames {
 struct UncertaintySummary {
   std::size_t evaluationCount = 0;
   std::size_t failedCount = 0;                    ///< left out of the statistics of measures and objective functions
-  std::vector<SampleSummary> parameters;          ///< of all sets drawn, as the model gets them
+  std::vector<SampleSummary> parameters;          ///< of all sets evaluated, as the model gets them
   std::vector<std::vector<double>> correlations;  ///< of the same values
   std::vector<SampleSummary> measures;
   std::vector<SampleSummary> objectives;

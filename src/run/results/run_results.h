@@ -56,6 +56,8 @@ class RunResults final {
  private:
   void startAfresh(const RunConfig& config, RunLog& log);
   void keepEarlierFiles(const RunConfig& config, RunLog& log) const;
+  /// Those of an unfinished run do not count any more when it goes on, and can be computed again.
+  void removeStatistics(const RunConfig& config) const;
   void goOn(const RunConfig& config, const ObjectiveAggregator& aggregator, RunLog& log);
 
   SearchSpace space_;
@@ -65,6 +67,7 @@ class RunResults final {
   ResultFileNames names_;
   RestartFiles files_;
   std::optional<EarlierRun> earlierRun_;
+  bool earlierRunHasStatistics_ = false;  ///< of an analysis that did not come to its end
   ResultFile table_;
   FailedRunFile failedRuns_;
   RunRecordFile record_;

@@ -3,12 +3,14 @@
 #include <algorithm>
 #include <cmath>
 #include <limits>
+#include <map>
 #include <utility>
 
 #include <fmt/format.h>
 
 #include "algorithms/analyses/covariance.h"
 #include "common/calendar.h"
+#include "evaluation/stored_results.h"
 #include "measures/period_series.h"
 #include "run/tasks/analysis_names.h"
 
@@ -149,15 +151,33 @@ int SensitivityTask::plannedEvaluations(std::size_t variableCount) const {
   return 1 + perParameter * static_cast<int>(variableCount);
 }
 
-TaskOutcome SensitivityTask::run(const TaskContext& context) {
+TaskOutcome SensitivityTask::outcomeOf(const TaskContext& context, const LocalSensitivity& sensitivity) const {
   TaskOutcome outcome{std::string(kEndOfTask)};
-  const LocalSensitivity sensitivity = localSensitivity(settings, context.space, context.evaluator);
   const AnalysisNames names = analysisNames(context);
   outcome.report = formatSensitivity(sensitivity, names);
   outcome.tables = sensitivityTables(sensitivity, names);
   if (settings.calculatesCovariance) addCovariance(context, sensitivity, outcome);
+  return outcome;
+}
+
+TaskOutcome SensitivityTask::run(const TaskContext& context) {
+  TaskOutcome outcome = outcomeOf(context, localSensitivity(settings, context.space, context.evaluator));
   logReport(context, outcome.report);
   return outcome;
+}
+
+std::optional<TaskOutcome> SensitivityTask::unfinishedOutcome(const TaskContext& context,
+                                                              const UnfinishedBatch& made) const {
+  std::map<int, EvaluationResult> results;
+  for (const EvaluationResult& result : made.results) results[result.number] = result;
+  EvaluationResult missing;
+  missing.measureValues.assign(context.measures.size(), kFailedRunValue);
+  missing.objectiveValues.assign(context.objectives.size(), kFailedRunValue);
+  missing.failure = {EvaluationFailure::Kind::notKnown, "the run ended before", {}};
+  StoredResults evaluator(std::move(results), std::move(missing));
+  const LocalSensitivity sensitivity = localSensitivity(settings, context.space, evaluator);
+  if (!sensitivity.results.front().ok()) return std::nullopt;  // every difference is to it, or compared with it
+  return outcomeOf(context, sensitivity);
 }
 
 }  // namespace mirevo

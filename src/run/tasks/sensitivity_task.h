@@ -17,10 +17,14 @@ class SensitivityTask final : public Task {
   int plannedEvaluations(std::size_t variableCount) const override;
   bool keepsSimulatedValues() const override { return settings.calculatesCovariance; }
   TaskOutcome run(const TaskContext& context) override;
+  std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const override;
   TaskReport report() const override { return {.sensitivity = &settings}; }
 
   SensitivityType type = SensitivityType::local;
   SensitivitySettings settings;
+
+ private:
+  TaskOutcome outcomeOf(const TaskContext& context, const LocalSensitivity& sensitivity) const;
 };
 
 }  // namespace mirevo

@@ -125,6 +125,13 @@ class Task {
   /// Runs it. Throws FatalError and RunCancelled.
   virtual TaskOutcome run(const TaskContext& context) = 0;
 
+  /// What can be said of the evaluations `made` when an error or a cancellation has ended run(); nothing is logged.
+  /// Empty if nothing can, and for a task without statistics.
+  virtual std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& /*context*/,
+                                                       const UnfinishedBatch& /*made*/) const {
+    return std::nullopt;
+  }
+
   virtual TaskReport report() const { return {}; }
 
   /// For a search, what becomes of an earlier one with a smaller budget; empty if the budget was not raised.

@@ -29,6 +29,20 @@ std::vector<std::string> reportBands(const TaskContext& context, std::span<const
   return lines;
 }
 
+TaskOutcome outcomeOf(const TaskContext& context, const UncertaintyOutcome& found) {
+  TaskOutcome outcome{std::string(kEndOfTask)};
+  const UncertaintySummary summary = summariseUncertainty(found, context.space);
+  const AnalysisNames names = analysisNames(context);
+  outcome.report =
+      formatUncertainty(summary, names, fileNameOf(runFilePath(context.filePrefix, run_files::kSampleCorrelation)));
+  outcome.report.insert(outcome.report.begin() + 1, setsOutsideBounds(found.sample, context.space));
+  outcome.tables = uncertaintyTables(summary, names);
+  const std::vector<std::string> bands = reportBands(context, found.results, outcome.files);
+  outcome.report.emplace_back();
+  outcome.report.insert(outcome.report.end(), bands.begin(), bands.end());
+  return outcome;
+}
+
 }  // namespace
 
 const TaskFacts& UncertaintyTask::facts() const {
@@ -74,19 +88,14 @@ TaskOutcome UncertaintyTask::run(const TaskContext& context) {
   const UncertaintyOutcome found = uncertaintyAnalysis(
       settings, randomSeed, context.evaluator, [&](std::string_view text) { context.log.line(text); },
       [&](std::span<const ParameterSet> sample) { context.log.line(setsOutsideBounds(sample, context.space)); });
-  TaskOutcome outcome{std::string(kEndOfTask)};
-  const UncertaintySummary summary = summariseUncertainty(found, context.space);
-  const AnalysisNames names = analysisNames(context);
-  outcome.report =
-      formatUncertainty(summary, names, fileNameOf(runFilePath(context.filePrefix, run_files::kSampleCorrelation)));
-  outcome.tables = uncertaintyTables(summary, names);
+  TaskOutcome outcome = outcomeOf(context, found);
   logReport(context, outcome.report);
-  const std::vector<std::string> bands = reportBands(context, found.results, outcome.files);
-  logReport(context, bands);
-  outcome.report.insert(outcome.report.begin() + 1, setsOutsideBounds(found.sample, context.space));  // logged before
-  outcome.report.emplace_back();
-  outcome.report.insert(outcome.report.end(), bands.begin(), bands.end());
   return outcome;
+}
+
+std::optional<TaskOutcome> UncertaintyTask::unfinishedOutcome(const TaskContext& context,
+                                                              const UnfinishedBatch& made) const {
+  return outcomeOf(context, {made.sets, made.results});
 }
 
 }  // namespace mirevo

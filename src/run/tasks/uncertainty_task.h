@@ -18,6 +18,7 @@ class UncertaintyTask final : public Task {
   bool drawsRandomNumbers() const override { return true; }
   bool keepsSimulatedValues() const override { return true; }
   TaskOutcome run(const TaskContext& context) override;
+  std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const override;
   TaskReport report() const override { return {.hasBands = true}; }
 
   UncertaintySettings settings;
