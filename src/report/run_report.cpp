@@ -238,13 +238,16 @@ void ReportBuilder::addAnalyses() {
   const auto& analysed = sources_.record.analysed;
   const bool hasAnalysis = isFinished || analysed;
   const TaskReport task = config_.task->report();
-  if (analysed) {
-    note(fmt::format("The statistics are those of an unfinished run: of {} of {} evaluations.", *analysed,
+  if (task.hasBands && hasAnalysis) data_.bands = reportedBands(config_, filePrefix_);
+  if (task.sensitivity != nullptr) {
+    data_.sensitivity = reportedSensitivity(config_, *task.sensitivity, space(), sources_.results.rows);
+  }
+  if (!isFinished && (analysed || data_.sensitivity)) {
+    const std::vector<bool>& ok = data_.evaluations.ok;
+    note(fmt::format("The statistics are those of an unfinished run: of {} of {} evaluations.",
+                     analysed.value_or(static_cast<int>(std::count(ok.begin(), ok.end(), true))),
                      config_.plannedEvaluations()));
   }
-  if (task.hasBands && hasAnalysis) data_.bands = reportedBands(config_, filePrefix_);
-  if (task.sensitivity == nullptr) return;
-  data_.sensitivity = reportedSensitivity(config_, *task.sensitivity, space(), sources_.results.rows);
   if (!data_.sensitivity || !hasAnalysis) return;
   std::string fault;
   data_.sensitivity->covariance = reportedCovariance(filePrefix_, fault);

@@ -84,9 +84,11 @@ const SettingSection<NormalDistribution>& distributionSection() {
       {"UNCERTAINTY_ESTIMATION/PARAMETER_n",
        "for each variable parameter",
        "The normal distribution of the n-th *variable* parameter, counted in the order of `MODEL_PARAMETERS`.",
-       {setting<&NormalDistribution::mean>({.name = "Mean_Value",
-                                            .unit = "search scale",
-                                            .meaning = "Mean; that of the logarithm for a logarithmic parameter."}),
+       {setting<&NormalDistribution::mean>(
+            {.name = "Mean_Value",
+             .unit = "search scale",
+             .meaning = "Mean; that of the logarithm for a logarithmic parameter, half a step above "
+                        "the value meant for an integer parameter."}),
         setting<&NormalDistribution::standardDeviation>(
             {.name = "Standard_Deviation",
              .range = kPositive,
