@@ -38,7 +38,7 @@ void setUpModel(benchmark::State& state) {
     benchmark::DoNotOptimize(model.evaluationOrder().data());
   }
 }
-BENCHMARK(setUpModel)->Args({10, 3})->Args({1000, 300})->Unit(benchmark::kMillisecond);
+BENCHMARK(setUpModel)->Args({10, 3})->Args({1000, 300})->Args({5000, 4000})->Unit(benchmark::kMillisecond);
 
 void mapToModelValues(benchmark::State& state) {
   const std::vector<ModelParameter> parameters =

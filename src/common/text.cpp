@@ -4,6 +4,7 @@
 #include <charconv>
 #include <cmath>
 #include <numeric>
+#include <utility>
 
 #include <fmt/core.h>
 
@@ -25,22 +26,6 @@ bool isTooSmall(std::string_view number) {
     return e + 1 < number.size() && number[e + 1] == '-';
   }
   return number.find_first_of("123456789") > number.find('.');
-}
-
-/// Levenshtein distance, case ignored.
-std::size_t editDistance(std::string_view a, std::string_view b) {
-  std::vector<std::size_t> row(b.size() + 1);
-  std::iota(row.begin(), row.end(), std::size_t{0});
-  for (std::size_t i = 1; i <= a.size(); ++i) {
-    std::size_t diagonal = row[0];
-    row[0] = i;
-    for (std::size_t j = 1; j <= b.size(); ++j) {
-      const std::size_t substitution = diagonal + (lowerAscii(a[i - 1]) == lowerAscii(b[j - 1]) ? 0 : 1);
-      diagonal = row[j];
-      row[j] = std::min({row[j] + 1, row[j - 1] + 1, substitution});
-    }
-  }
-  return row[b.size()];
 }
 
 }  // namespace
@@ -118,6 +103,24 @@ std::string withNumber(std::string_view text, std::int64_t number) {
     result.replace(position, 1, std::to_string(number));
   }
   return result;
+}
+
+std::size_t editDistance(std::string_view a, std::string_view b) {
+  const auto same = [&](std::size_t i, std::size_t j) { return lowerAscii(a[i]) == lowerAscii(b[j]); };
+  std::vector<std::size_t> beforeLast;
+  std::vector<std::size_t> last;
+  std::vector<std::size_t> row(b.size() + 1);
+  std::iota(row.begin(), row.end(), std::size_t{0});
+  for (std::size_t i = 1; i <= a.size(); ++i) {
+    beforeLast = std::exchange(last, row);
+    row[0] = i;
+    for (std::size_t j = 1; j <= b.size(); ++j) {
+      row[j] = std::min({last[j] + 1, row[j - 1] + 1, last[j - 1] + (same(i - 1, j - 1) ? 0 : 1)});
+      const bool isSwap = i > 1 && j > 1 && same(i - 1, j - 2) && same(i - 2, j - 1);
+      if (isSwap) row[j] = std::min(row[j], beforeLast[j - 2] + 1);
+    }
+  }
+  return row[b.size()];
 }
 
 std::optional<std::string> nearestName(std::string_view name, std::span<const std::string> candidates) {

@@ -44,7 +44,11 @@ constexpr bool isControlCharacter(char c) {
 /// `text` between double quotes for a message: cut to a readable length, control characters replaced.
 std::string quotedForMessage(std::string_view text);
 
-/// The candidate nearest to `name` (Levenshtein distance, case ignored), for "did you mean"; empty when none is within
+/// How many characters must be inserted, left out, replaced or swapped with their neighbour to get from one name to the
+/// other; case is ignored.
+std::size_t editDistance(std::string_view a, std::string_view b);
+
+/// The candidate nearest to `name` by editDistance(), for "did you mean"; empty when none is within
 /// a third of the name's length, or one edit for short names.
 std::optional<std::string> nearestName(std::string_view name, std::span<const std::string> candidates);
 

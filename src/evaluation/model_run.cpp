@@ -92,7 +92,8 @@ ModelRunner::ModelRunner(ModelDescription description, ParameterModel& parameter
   for (std::size_t i = 0; i < description_.measures.size() && description_.keepSimulatedValues; ++i) {
     const OutputMeasure& measure = description_.measures[i];
     if (measure.interfaceType != InterfaceType::timeSeries) continue;
-    observedSeries_.push_back(readObservedSeries(i, measure, description_.period, series_.observation(i)));
+    observedSeries_.push_back(
+        readObservedSeries(i, measure, description_.period, description_.keptPrecision, series_.observation(i)));
   }
   if (launcherSettings.slotCount > 0 && !launcher_.initialise(launcherSettings)) {
     fatalError("Error: Unable to initialise MirevoSimpleLaunch", launcher_.lastError());
@@ -333,8 +334,8 @@ std::optional<EvaluationFailure> ModelRunner::readMeasures(int slot, EvaluationR
   }
   for (const ObservedSeries& observed : observedSeries_) {
     if (failure) break;
-    appendSimulatedValues(observed, description_.measures[observed.measure], series_.simulation(observed.measure),
-                          result.simulatedValues);
+    appendSimulatedValues(observed, description_.measures[observed.measure], description_.keptPrecision,
+                          series_.simulation(observed.measure), result.simulatedValues);
   }
   return failure;
 }
@@ -351,10 +352,10 @@ std::optional<EvaluationFailure> ModelRunner::readSeriesMeasure(int slot, std::s
   }
   try {
     // A model that stopped early is a failed evaluation; a setup whose period no model run can match ends the run.
-    if (series_.hadPairs(i) && !hasPairs(measure, description_.period, simulation, series_.observation(i))) {
+    if (series_.needsPairs(i) && !hasPairs(measure, description_.period, simulation, series_.observation(i))) {
       return makeFailure(Kind::resultsNotWritten,
                          fmt::format("{}: item No. {} ({}) has no value at any observation time in the evaluation "
-                                     "period, as it had before the run",
+                                     "period",
                                      path, measure.simulation.itemNo, simulation.itemName(measure.simulation.itemNo)),
                          slot);
     }

@@ -32,6 +32,7 @@ struct ModelDescription {
   std::string savedFolder;              ///< where they are kept
   std::string failedFolderPrefix;       ///< path of a failed run's folder, without the evaluation number that follows
   bool keepSimulatedValues = false;     ///< results hold the simulated values at the observation times
+  SeriesPrecision keptPrecision = SeriesPrecision::single;
 };
 
 /// Model runs in slots: writes the input, starts the batch, and turns its output into a result. Used by the local loop

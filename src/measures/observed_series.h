@@ -18,12 +18,15 @@ struct ObservedSeries {
   std::vector<double> values;  ///< one per time
 };
 
+/// The values as the statistics use them, or with all digits of their file.
+enum class SeriesPrecision { single, exact };
+
 /// The period includes both ends. Throws FatalError if the item cannot be read.
 ObservedSeries readObservedSeries(std::size_t index, const OutputMeasure& measure, const EvaluationPeriod& period,
-                                  TimeSeriesObject& observation);
+                                  SeriesPrecision precision, TimeSeriesObject& observation);
 
 /// Appends the simulated value at each observation time to `values`, NaN where there is none.
-void appendSimulatedValues(const ObservedSeries& observed, const OutputMeasure& measure, TimeSeriesObject& simulation,
-                           std::vector<double>& values);
+void appendSimulatedValues(const ObservedSeries& observed, const OutputMeasure& measure, SeriesPrecision precision,
+                           TimeSeriesObject& simulation, std::vector<double>& values);
 
 }  // namespace mirevo

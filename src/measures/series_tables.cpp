@@ -9,6 +9,7 @@
 #include "common/fatal_error.h"
 #include "common/text.h"
 #include "measures/measure_statistics.h"
+#include "measures/observed_series.h"
 
 namespace mirevo {
 namespace {
@@ -77,14 +78,19 @@ SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> mea
 }
 
 void SeriesTables::checkItems(std::span<const OutputMeasure> measures, const EvaluationPeriod& period) {
-  hadPairs_.assign(measures.size(), false);
+  needsPairs_.assign(measures.size(), false);
   for (std::size_t i = 0; i < measures.size(); ++i) {
     if (observationIndex_[i] == kNoSeries) continue;
     requireItem(observation(i), measures[i].observation);
     // Files in the base folder that have no time steps yet tell nothing about their columns.
-    if (simulation(i).timeStepCount() < 1) continue;
+    if (simulation(i).timeStepCount() < 1) {
+      const ObservedSeries observed =
+          readObservedSeries(i, measures[i], period, SeriesPrecision::single, observation(i));
+      needsPairs_[i] = !observed.values.empty();
+      continue;
+    }
     requireItem(simulation(i), measures[i].simulation);
-    hadPairs_[i] = observation(i).timeStepCount() > 0 && hasPairs(measures[i], period, simulation(i), observation(i));
+    needsPairs_[i] = observation(i).timeStepCount() > 0 && hasPairs(measures[i], period, simulation(i), observation(i));
   }
 }
 

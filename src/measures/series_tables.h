@@ -36,9 +36,10 @@ class SeriesTables final {
   /// The file of the measure with this 0-based index; simulation() may be called only between open and release.
   TimeSeriesObject& observation(std::size_t measure);
   TimeSeriesObject& simulation(std::size_t measure);
-  /// Whether the simulated file in the base folder had a value for any observation of the measure in the period. If so,
-  /// a model run without one is not the fault of the setup.
-  bool hadPairs(std::size_t measure) const { return hadPairs_.at(measure); }
+  /// Whether a model run without a simulated value for any observation of the measure in the period is the run's own
+  /// fault and not the setup's: the file in the base folder has such values, or has no time steps yet and there are
+  /// observations in the period. Told before the first model run, so that it depends on no other run.
+  bool needsPairs(std::size_t measure) const { return needsPairs_.at(measure); }
 
  private:
   static constexpr std::size_t kNoSeries = static_cast<std::size_t>(-1);  ///< index of a measure of interface type 1
@@ -49,7 +50,7 @@ class SeriesTables final {
   std::vector<std::string> simulationNames_;
   std::vector<std::size_t> observationIndex_;  ///< one per measure, 0-based
   std::vector<std::size_t> simulationIndex_;
-  std::vector<bool> hadPairs_;                     ///< one per measure
+  std::vector<bool> needsPairs_;                   ///< one per measure
   std::vector<std::vector<int>> simulationItems_;  ///< one per simulation file: the item numbers in use
   std::vector<std::unique_ptr<TimeSeriesObject>> observations_;
   std::vector<std::unique_ptr<TimeSeriesObject>> simulations_;

@@ -1,7 +1,7 @@
 #include "parameters/dependency_order.h"
 
 #include <algorithm>
-#include <numeric>
+#include <cstdint>
 
 #include <fmt/core.h>
 
@@ -85,34 +85,85 @@ void refuseRings(std::span<const ModelParameter> parameters, NamedParameters nam
              chain);
 }
 
+/// A permutation of 0..N-1 in which an element is moved, and the order of two compared, in constant time on average: a
+/// ring of elements with labels that increase along it, kept apart as in Dietz and Sleator (1987), Two algorithms for
+/// maintaining order in a list. Labels wrap around; they are compared by their distance from the ring's base, element
+/// N.
+class OrderedList final {
+ public:
+  explicit OrderedList(std::size_t count) : base_(count), next_(count + 1), previous_(count + 1), labels_(count + 1) {
+    const std::uint64_t gap = ~std::uint64_t{0} / (count + 1);
+    for (std::size_t i = 0; i <= count; ++i) {
+      labels_[i] = i == base_ ? 0 : gap * (i + 1);
+      next_[i] = i == base_ ? 0 : i + 1;
+      previous_[next_[i]] = i;
+    }
+  }
+
+  bool isEmpty() const { return next_[base_] == base_; }
+  std::size_t front() const { return next_[base_]; }
+  bool isBefore(std::size_t a, std::size_t b) const {
+    return labels_[a] - labels_[base_] < labels_[b] - labels_[base_];
+  }
+  void remove(std::size_t element) {
+    next_[previous_[element]] = next_[element];
+    previous_[next_[element]] = previous_[element];
+  }
+  void insertAfter(std::size_t before, std::size_t element) {
+    if (labels_[next_[before]] - labels_[before] == 1) makeGapAfter(before);
+    const std::size_t after = next_[before];
+    labels_[element] = labels_[before] + (labels_[after] - labels_[before]) / 2;
+    previous_[element] = before;
+    next_[element] = after;
+    next_[before] = previous_[after] = element;
+  }
+
+ private:
+  /// Spreads the labels of the j - 1 elements behind `before` evenly up to the first whose label is more than j * j
+  /// further on.
+  void makeGapAfter(std::size_t before) {
+    const std::uint64_t start = labels_[before];
+    std::uint64_t count = 1;
+    std::size_t end = next_[before];
+    for (; end != before && labels_[end] - start <= count * count; end = next_[end]) ++count;
+    const std::uint64_t gap = (end == before ? ~std::uint64_t{0} : labels_[end] - start) / count;
+    std::size_t element = next_[before];
+    for (std::uint64_t k = 1; k < count; ++k, element = next_[element]) labels_[element] = start + k * gap;
+  }
+
+  std::size_t base_;
+  std::vector<std::size_t> next_;
+  std::vector<std::size_t> previous_;
+  std::vector<std::uint64_t> labels_;
+};
+
 }  // namespace
 
 std::vector<int> OrderDependentParameters(std::span<const ModelParameter> parameters, NamedParameters named) {
   refuseMutualDependencies(parameters, named);
   refuseRings(parameters, named);
 
-  std::vector<std::size_t> order(parameters.size());
-  std::iota(order.begin(), order.end(), std::size_t{0});
-  std::vector<std::size_t> position = order;
-  std::size_t p = 0;
-  while (p < order.size()) {
-    std::size_t latest = p;
-    for (const std::size_t j : named[order[p]]) latest = std::max(latest, position[j]);
-    if (latest == p) {
-      ++p;
-      continue;
+  OrderedList list(parameters.size());
+  std::vector<bool> isSettled(parameters.size(), false);
+  std::vector<int> order;
+  order.reserve(parameters.size());
+  // Those before the first parameter of the list name no later one and are not moved, so the scan need not start again.
+  while (!list.isEmpty()) {
+    const std::size_t first = list.front();
+    std::size_t latest = first;
+    for (const std::size_t j : named[first]) {
+      if (!isSettled[j] && list.isBefore(latest, j)) latest = j;
     }
-    // Moves the parameter past the latest one that it names; those between move forward by one position. Those before p
-    // name no later one and are not moved, so the scan can continue from p.
-    std::rotate(order.begin() + static_cast<std::ptrdiff_t>(p), order.begin() + static_cast<std::ptrdiff_t>(p) + 1,
-                order.begin() + static_cast<std::ptrdiff_t>(latest) + 1);
-    for (std::size_t q = p; q <= latest; ++q) position[order[q]] = q;
+    list.remove(first);
+    if (latest != first) {
+      // One move past the latest parameter that it names; those between keep their order.
+      list.insertAfter(latest, first);
+    } else {
+      isSettled[first] = true;
+      order.push_back(static_cast<int>(first) + 1);
+    }
   }
-
-  std::vector<int> result(order.size());
-  std::transform(order.begin(), order.end(), result.begin(),
-                 [](std::size_t index) { return static_cast<int>(index) + 1; });
-  return result;
+  return order;
 }
 
 }  // namespace mirevo

@@ -29,6 +29,7 @@ struct ModelParameter {
   std::string equation;  ///< for a dependent parameter
   std::string comment;
   std::vector<std::string> keyLines;  ///< kept with the parameter, not interpreted
+  std::vector<double> givenValues;    ///< further values that the setup gives for runs, model scale
 };
 
 /// Compares two equations over the model parameters; a parameter set that violates it is not run.

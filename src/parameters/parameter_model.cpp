@@ -126,9 +126,7 @@ void ParameterModel::Implementation::assignVariableParameters(std::span<const do
   for (const int number : order_) {
     const auto i = static_cast<std::size_t>(number) - 1;
     if (parameters_[i].parameterType != ParameterType::variable) continue;
-    bool failed = false;
-    values_[i] = TransformParameterValue(set[k], space_.lower[k], space_.transformation[k],
-                                         TransformDirection::backward, failed);
+    values_[i] = toModelScale(space_, k, set[k]);
     ++k;
   }
 }

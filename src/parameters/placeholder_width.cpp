@@ -19,7 +19,7 @@ constexpr int kSignificantDigits = 4;
 constexpr double kNegligible = 1.0e-3;
 
 bool keepsDigits(double value, int width) {
-  const std::optional<double> written = parseReal(FormatValueForPlaceholder(value, width));
+  const std::optional<double> written = valueAsWritten(value, width);
   if (!written) return false;
   if (value == 0.0 || *written == value) return true;
   const double unit = std::pow(10.0, std::floor(std::log10(std::abs(value))) - (kSignificantDigits - 1));

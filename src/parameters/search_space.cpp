@@ -38,6 +38,15 @@ double transformForward(const ModelParameter& parameter, double value, std::stri
   return transformed;
 }
 
+/// Adds those of the parameter that is the last of the space so far.
+void addGivenValues(const ModelParameter& parameter, SearchSpace& space) {
+  std::vector<double> values{parameter.initialValue, parameter.lowerBound, parameter.upperBound};
+  values.insert(values.end(), parameter.givenValues.begin(), parameter.givenValues.end());
+  for (const double value : values) {
+    if (value > 0.0) space.givenValues.try_emplace({space.size() - 1, std::log(value)}, value);
+  }
+}
+
 }  // namespace
 
 double TransformParameterValue(double value, double lowerBound, TransformationType type, TransformDirection direction,
@@ -71,19 +80,23 @@ SearchSpace BuildSearchSpace(std::span<const ModelParameter> parameters) {
     if (parameter.transformationType == TransformationType::integer) upper += 1.0;
     space.upper.push_back(upper);
     space.transformation.push_back(parameter.transformationType);
+    if (parameter.transformationType == TransformationType::logarithmic) addGivenValues(parameter, space);
   }
   if (space.names.empty()) fatalError("Error: No variable model parameters defined");
   return space;
 }
 
+double toModelScale(const SearchSpace& space, std::size_t k, double value) {
+  const auto given = space.givenValues.find({k, value});
+  if (given != space.givenValues.end() && given->first.second == value) return given->second;  // not for NaN
+  bool failed = false;
+  return TransformParameterValue(value, space.lower[k], space.transformation[k], TransformDirection::backward, failed);
+}
+
 std::vector<double> ToModelScale(const SearchSpace& space, std::span<const double> set) {
   assert(set.size() == space.size());
   std::vector<double> values(space.size());
-  for (std::size_t k = 0; k < values.size(); ++k) {
-    bool failed = false;
-    values[k] =
-        TransformParameterValue(set[k], space.lower[k], space.transformation[k], TransformDirection::backward, failed);
-  }
+  for (std::size_t k = 0; k < values.size(); ++k) values[k] = toModelScale(space, k, set[k]);
   return values;
 }
 

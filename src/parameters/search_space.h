@@ -1,7 +1,9 @@
 #pragma once
 
+#include <map>
 #include <span>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "common/parameter_set.h"
@@ -25,6 +27,9 @@ struct SearchSpace {
   /// [lower, upper + 1), so that truncation gives every integer the same width.
   std::vector<double> upper;
   std::vector<TransformationType> transformation;
+  /// The values that the setup gives for logarithmic parameters, by parameter and value on the search scale: exp(ln(x))
+  /// is not always x, but a run gets a given value as it was given.
+  std::map<std::pair<std::size_t, double>, double> givenValues = {};
 
   std::size_t size() const { return names.size(); }
 };
@@ -32,6 +37,9 @@ struct SearchSpace {
 /// Derives the search space from all parameters. Throws FatalError for an initial value outside its bounds, a
 /// transformation that fails, or no variable parameter at all.
 SearchSpace BuildSearchSpace(std::span<const ModelParameter> parameters);
+
+/// The model-scale value of parameter k for a value on the search scale.
+double toModelScale(const SearchSpace& space, std::size_t k, double value);
 
 /// The values of a set on the model scale, in the order of the set.
 std::vector<double> ToModelScale(const SearchSpace& space, std::span<const double> set);

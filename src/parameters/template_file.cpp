@@ -132,6 +132,13 @@ std::vector<std::size_t> ParameterTemplate::parametersNamed() const {
   return indices;
 }
 
+void ParameterTemplate::raiseToWidest(std::vector<int>& widths) const {
+  for (const Placeholder& placeholder : placeholders_) {
+    int& width = widths[placeholder.parameter];
+    width = std::max(width, placeholder.width);
+  }
+}
+
 std::vector<std::string> ParameterTemplate::narrowPlaceholderWarnings(
     std::span<const ModelParameter> parameters) const {
   std::vector<std::string> warnings;
@@ -156,6 +163,12 @@ std::vector<std::string> ParameterTemplate::narrowPlaceholderWarnings(
     }
   }
   return warnings;
+}
+
+std::vector<int> widestPlaceholders(std::span<const ParameterTemplate> templates, std::size_t parameterCount) {
+  std::vector<int> widths(parameterCount, 0);
+  for (const ParameterTemplate& each : templates) each.raiseToWidest(widths);
+  return widths;
 }
 
 void WriteParameterFile(const std::string& path, const ParameterTemplate& parameterTemplate,

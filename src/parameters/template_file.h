@@ -51,6 +51,9 @@ class ParameterTemplate final {
   /// 0-based indices of the parameters that the template names, ascending, each once.
   std::vector<std::size_t> parametersNamed() const;
 
+  /// Raises `widths`, one entry per parameter, to those of the placeholders.
+  void raiseToWidest(std::vector<int>& widths) const;
+
   /// One warning per placeholder in which values between the parameter's bounds keep fewer than four significant
   /// digits, with the width to use, and one per placeholder next to a digit or sign, since the model may read both as
   /// one number.
@@ -68,6 +71,9 @@ class ParameterTemplate final {
   std::vector<std::string> pieces_;  ///< text before, between and after the placeholders
   std::vector<Placeholder> placeholders_;
 };
+
+/// By parameter, the width of its widest placeholder in any of the templates; 0: it has none.
+std::vector<int> widestPlaceholders(std::span<const ParameterTemplate> templates, std::size_t parameterCount);
 
 /// Rewrites an existing parameter file, keeping its mode. Throws FatalError with "Error: Unable to open " and the path,
 /// and the system's reason below.

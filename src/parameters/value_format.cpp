@@ -7,6 +7,8 @@
 
 #include <fmt/core.h>
 
+#include "common/text.h"
+
 namespace mirevo {
 namespace {
 
@@ -84,6 +86,10 @@ std::string FormatValueForPlaceholder(double value, int width) {
 
 bool isWritable(double value) {
   return FormatValueForPlaceholder(value, kMaximumValueWidth).front() != kUnwritable;
+}
+
+std::optional<double> valueAsWritten(double value, int width) {
+  return parseReal(FormatValueForPlaceholder(value, width));
 }
 
 }  // namespace mirevo

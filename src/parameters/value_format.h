@@ -1,5 +1,6 @@
 #pragma once
 
+#include <optional>
 #include <string>
 
 namespace mirevo {
@@ -14,5 +15,8 @@ std::string FormatValueForPlaceholder(double value, int width);
 
 /// Whether the text of a value is a number and not "*", which does not depend on the width.
 bool isWritable(double value);
+
+/// The value that a model reads from a placeholder of this width; empty if that holds no number.
+std::optional<double> valueAsWritten(double value, int width);
 
 }  // namespace mirevo

@@ -12,10 +12,13 @@
 #include "algorithms/analyses/local_sensitivity.h"
 #include "common/calendar.h"
 #include "common/data_table.h"
+#include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/run_files.h"
+#include "common/text.h"
 #include "evaluation/stored_results.h"
 #include "measures/period_series.h"
+#include "parameters/template_file.h"
 #include "platform/series/time_series_object.h"
 
 namespace mirevo {
@@ -36,6 +39,25 @@ StoredResults resultsOf(const RunConfig& config, std::span<const ResultRow> rows
   missing.objectiveValues.assign(config.objectives.size(), kFailedRunValue);
   missing.failure.emplace();
   return {std::move(results), std::move(missing)};
+}
+
+/// The widths of the placeholders as the run had them; a template that is no longer there has none.
+std::vector<int> fieldWidths(const RunConfig& config) {
+  std::vector<ParameterTemplate> templates;
+  for (const ParameterFileItem& item : config.parameterFiles) {
+    const std::string name(trimTrailing(item.templateFileName));
+    const bool isNumericId = item.templateType == TemplateType::numericId;
+    std::string reason;
+    const auto text = readTextFile(name, reason);
+    if (!text) continue;
+    try {
+      templates.emplace_back(name, isNumericId ? ConvertIdTemplate(name, *text, config.parameters) : *text,
+                             config.parameters, isNumericId);
+    } catch (const FatalError&) {
+      continue;  // changed since the run
+    }
+  }
+  return widestPlaceholders(templates, config.parameters.size());
 }
 
 /// Puts the outputs of one table behind those of another: p rows each.
@@ -116,7 +138,8 @@ std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, 
   const auto isBase = [](const ResultRow& row) { return row.number == 1 && row.ok; };
   if (std::none_of(rows.begin(), rows.end(), isBase)) return std::nullopt;
   StoredResults evaluator = resultsOf(config, rows);
-  const LocalSensitivity found = localSensitivity(settings, space, evaluator);
+  const LocalSensitivity found =
+      localSensitivity(settings, space, evaluator, ofVariableParameters(fieldWidths(config), config.parameters));
   ReportedSensitivity reported;
   reported.parameters = space.names;
   for (const OutputMeasure& measure : config.measures) reported.outputs.push_back(measure.name);
@@ -128,6 +151,25 @@ std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, 
   reported.composite = config.objectives.empty() ? found.measures.composite : found.objectives.composite;
   for (const std::size_t i : found.ranking) reported.ranking.push_back(space.names[i]);
   return reported;
+}
+
+void takeObservationComposites(const std::string& filePrefix, ReportedSensitivity& sensitivity) {
+  std::string fault;
+  const ReadTable table = readTable(runFilePath(filePrefix, run_files::kSensitivities), fault);
+  const auto kind = table.column("Kind");
+  const auto composite = table.column("Composite");
+  if (!kind || !composite) return;
+  std::vector<double> found;
+  for (const std::vector<std::string>& cells : table.rows) {
+    if (cells[*kind] != "observations" || found.size() == sensitivity.parameters.size()) continue;
+    if (cells.front() != sensitivity.parameters[found.size()]) return;
+    found.push_back(realCell(cells[*composite]).value_or(std::numeric_limits<double>::quiet_NaN()));
+  }
+  if (found.empty() || found.size() != sensitivity.parameters.size()) return;
+  sensitivity.composite = std::move(found);
+  sensitivity.isOfObservations = true;
+  sensitivity.ranking.clear();
+  for (const std::size_t i : ranked(sensitivity.composite)) sensitivity.ranking.push_back(sensitivity.parameters[i]);
 }
 
 std::optional<ReportedCovariance> reportedCovariance(const std::string& filePrefix, std::string& fault) {

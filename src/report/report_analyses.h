@@ -26,6 +26,10 @@ std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::stri
 std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, const SensitivitySettings& settings,
                                                        const SearchSpace& space, std::span<const ResultRow> rows);
 
+/// Takes the composites over the observations, and the ranking by them, from the tables of a finished analysis, if it
+/// has written any.
+void takeObservationComposites(const std::string& filePrefix, ReportedSensitivity& sensitivity);
+
 /// The covariance of the parameters that a finished sensitivity analysis has written beside its results; empty if there
 /// is none, or if its files cannot be read, with the reason in `fault`.
 std::optional<ReportedCovariance> reportedCovariance(const std::string& filePrefix, std::string& fault);

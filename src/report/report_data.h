@@ -105,6 +105,7 @@ struct ReportedSensitivity {
   std::vector<std::vector<double>> derivatives;
   std::vector<std::vector<double>> dimensionless;
   std::vector<double> composite;
+  bool isOfObservations = false;  ///< the composite, rather than of the objective functions or output measures
   std::vector<std::string> ranking;
   std::optional<ReportedCovariance> covariance;
 };

@@ -187,6 +187,7 @@ void writeSensitivity(JsonWriter& json, const ReportedSensitivity& sensitivity) 
   json.key("derivatives").rows(sensitivity.derivatives, Digits::drawn);
   json.key("dimensionless").rows(sensitivity.dimensionless, Digits::drawn);
   json.key("composite").numbers(sensitivity.composite, Digits::drawn).member("ranking", sensitivity.ranking);
+  json.member("isOfObservations", sensitivity.isOfObservations);
   json.key("covariance");
   if (sensitivity.covariance) {
     const ReportedCovariance& covariance = *sensitivity.covariance;

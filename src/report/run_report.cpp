@@ -115,6 +115,11 @@ void ReportBuilder::addRun() {
   run.stage = sources_.stage;
   run.message = sources_.record.message;
   run.reportMade = dateAndTimeNow();
+  const RunRecord& record = sources_.record;
+  for (const std::string& text : record.warnings) note("Warning: " + text);
+  if (const int more = record.warningCount - static_cast<int>(record.warnings.size()); more > 0) {
+    note(fmt::format("{} more of {} warnings are in {}.log.", more, record.warningCount, config_.setupName));
+  }
   run.planned = config_.plannedModelRuns();  // the final model run with the best set has a number, too
   run.aggregation = config_.aggregationMethod == AggregationMethod::zero
                         ? "every aggregate is 0"
@@ -249,6 +254,7 @@ void ReportBuilder::addAnalyses() {
                      config_.plannedEvaluations()));
   }
   if (!data_.sensitivity || !hasAnalysis) return;
+  takeObservationComposites(filePrefix_, *data_.sensitivity);
   std::string fault;
   data_.sensitivity->covariance = reportedCovariance(filePrefix_, fault);
   if (!fault.empty()) note(fmt::format("The covariance is not shown: {}.", fault));

@@ -1,6 +1,10 @@
 #include "run/command_line.h"
 
 #include <algorithm>
+#include <cstddef>
+#include <span>
+
+#include <fmt/core.h>
 
 #include "common/text.h"
 
@@ -11,6 +15,18 @@ constexpr std::size_t kMaximumArguments = 100;
 
 bool isSwitch(std::string_view argument) {
   return argument.starts_with("//");
+}
+
+bool asksForViewer(std::string_view argument) {
+  return equalIgnoringCase(argument, "//qmon");
+}
+
+std::string listOf(std::span<const std::string> arguments) {
+  std::string list;
+  for (const std::string& argument : arguments) {
+    list.append(list.empty() ? "" : ", ").append(quotedForMessage(argument));
+  }
+  return list;
 }
 
 }  // namespace
@@ -36,8 +52,25 @@ std::string_view CommandLine::setupFileName() const {
 }
 
 bool CommandLine::wantsProgressViewer() const {
-  return std::any_of(arguments_.begin(), arguments_.end(),
-                     [](const std::string& argument) { return equalIgnoringCase(argument, "//qmon"); });
+  return std::any_of(arguments_.begin(), arguments_.end(), asksForViewer);
+}
+
+std::vector<std::string> CommandLine::ignored() const {
+  std::vector<std::string> ordinary;
+  std::vector<std::string> switches;
+  for (const std::string& argument : arguments_) {
+    if (!isSwitch(argument)) ordinary.push_back(argument);
+    if (isSwitch(argument) && !asksForViewer(argument)) switches.push_back(argument);
+  }
+  const auto setup = static_cast<std::size_t>(countArguments()) - 1;  // counted among the ordinary ones, from 1
+  if (setup > 0 && setup <= ordinary.size()) ordinary.erase(ordinary.begin() + static_cast<std::ptrdiff_t>(setup) - 1);
+  std::vector<std::string> sentences;
+  if (!switches.empty()) sentences.push_back(fmt::format("Ignored: {}; the only switch is //qmon", listOf(switches)));
+  if (!ordinary.empty()) {
+    sentences.push_back(fmt::format("Ignored: {}; the setup file is the last argument, {}", listOf(ordinary),
+                                    quotedForMessage(setupFileName())));
+  }
+  return sentences;
 }
 
 }  // namespace mirevo

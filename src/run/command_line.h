@@ -23,6 +23,9 @@ class CommandLine final {
   /// The last ordinary argument: the setup file; empty when there is none or it is blank.
   std::string_view setupFileName() const;
 
+  /// What else is on the command line and has no effect, a sentence each: other ordinary arguments, unknown switches.
+  std::vector<std::string> ignored() const;
+
   /// Whether there is a "//qmon", in any letter case, which asks for the progress viewer.
   bool wantsProgressViewer() const;
 

@@ -95,6 +95,9 @@ void mirevoMain(const CommandLine& commandLine) {
     if (answers) answerQuestion(setupFileName);
     stopRun(0);
   }
+  if (answers) {
+    for (const std::string& sentence : commandLine.ignored()) showMessage(sentence, {}, MessageType::warning);
+  }
   int exitCode = 1;
   {
     RunDriver driver;

@@ -105,7 +105,7 @@ void RunDriver::openRun(const std::string& setupFileName) {
                setup.file + ": both would work in the same folders. Wait for it, or run a copy under another name.");
   }
   const std::string logFile = runFilePath(filePrefix_, run_files::kLog);
-  const std::string keptLog = keepEarlierFile(logFile);
+  const std::string keptLog = RunLog::isOfRefusedSetup(logFile) ? std::string() : keepEarlierFile(logFile);
   std::string reason;
   if (!state_.log.open(logFile, reason)) fatalError("Error: Unable to open " + logFile, reason);
   signalState.runLogDescriptor = state_.log.descriptor();
@@ -113,8 +113,14 @@ void RunDriver::openRun(const std::string& setupFileName) {
   state_.log.line("Setup file: " + setup.file);
   if (!keptLog.empty()) state_.log.line("The log of the earlier run was kept as " + keptLog);
 
-  const std::string terminationLogProblem = openTerminationLog(runFilePath(filePrefix_, run_files::kTerminationLog));
+  // Where the name of the setup is mistyped, nothing more is made than a log and a message file.
+  const std::string terminationLog = runFilePath(filePrefix_, run_files::kTerminationLog);
+  const bool leavesEnding =
+      std::filesystem::exists(setup.file, ignored) || std::filesystem::exists(terminationLog, ignored);
+  const std::string terminationLogProblem = leavesEnding ? openTerminationLog(terminationLog) : std::string();
   const std::string progressProblems = state_.progress.progressInit(logFile, environmentValue("VOLK_PROGRESS"));
+  state_.progress.progressStart(dateAndTimeWithZone(), hostName(), ::getpid());
+  state_.log.passWarningsTo([this](std::string_view text) { state_.progress.writeMessage(text); });
   for (const std::string_view problems :
        {std::string_view(terminationLogProblem), std::string_view(progressProblems)}) {
     for (const std::string_view problem : splitLines(problems)) {
@@ -122,7 +128,6 @@ void RunDriver::openRun(const std::string& setupFileName) {
       showMessage(problem, {}, MessageType::warning);
     }
   }
-  state_.progress.progressStart(dateAndTimeWithZone(), hostName(), ::getpid());
 }
 
 void RunDriver::buildModel() {
@@ -166,6 +171,7 @@ void RunDriver::logSetup() {
 }
 
 void RunDriver::openResults() {
+  isAccepted_ = true;
   state_.objectiveValues.resize(config_.objectives.size());
   results_->open(config_, runner_->observedSeries(), *aggregator_, state_.log);
   putEarlierReportAside();
@@ -238,7 +244,8 @@ TaskContext RunDriver::taskContext() {
           state_.log,
           [this](const SearchSummary& summary) { reporter_->takeBestOf(summary); },
           filePrefix_,
-          runner_->observedSeries()};
+          runner_->observedSeries(),
+          widestPlaceholders(runner_->templates(), config_.parameters.size())};
 }
 
 TaskOutcome RunDriver::runTask() {
@@ -307,6 +314,8 @@ void RunDriver::completeRecord(const Ending& ending) {
   record.stage = ending.stage;
   record.message = ending.message;
   record.ended = ending.time;
+  record.warningCount = state_.log.warningCount();
+  record.warnings = state_.log.warnings();
   if (!reporter_) return;
   record.initialEvaluation = reporter_->initial();
   if (const auto& best = reporter_->best()) record.best = ShownEvaluation{best->number, best->aggregate};
@@ -363,6 +372,9 @@ void RunDriver::finish(const TaskOutcome& outcome) {
     state_.log.line(fmt::format("{} of them were taken from the earlier run", reporter_->replayedCount()));
   }
   logFailures();
+  if (state_.log.warningCount() > 0) {
+    state_.log.line(warningCountText() + ": the lines above that begin with \"Warning: \"");
+  }
   state_.log.line("");
   state_.log.line(kNormalTermination);
   if (!state_.log.writeError().empty()) {
@@ -375,6 +387,23 @@ void RunDriver::finish(const TaskOutcome& outcome) {
     showMessage(fmt::format("Warning: The end of {} may be missing: {}", state_.log.path(), state_.log.writeError()));
   }
   endProgress(kNormalTermination);
+  if (count == 0) {
+    showMessage("Nothing was run: the setup selects no task or no search", {}, MessageType::warning);
+  }
+  tellOfWarnings();
+}
+
+std::string RunDriver::warningCountText() const {
+  const int count = state_.log.warningCount();
+  return count == 1 ? std::string("1 warning") : fmt::format("{} warnings", count);
+}
+
+/// Says on standard error how many warnings there are and where.
+void RunDriver::tellOfWarnings() const {
+  if (state_.log.warningCount() == 0) return;
+  showMessage(fmt::format("{} in {}{}: {}", warningCountText(), state_.log.path(),
+                          state_.log.warningCount() == 1 ? "" : "; the first", state_.log.warnings().front()),
+              {}, MessageType::warning);
 }
 
 /// Writes the reasons of the failures to the log, and how often each occurred.
@@ -403,6 +432,7 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
     if (reporter_ && reporter_->failedCount() > 0)
       text +=
           fmt::format("\nfailed model runs are described in {}", fileNameOf(results_->failedRuns().paths().forPeople));
+    if (!isAccepted_) state_.log.markRefused();
     showMessage(text);
     statistics = keepStatistics();
     state_.log.line("");
@@ -434,6 +464,7 @@ int RunDriver::endEarly(std::string_view ending) {
   if (launcher_) launcher_->haltProcesses();
   leaveJob(state_, 1, ending);
   endProgress(ending);
+  tellOfWarnings();
   return 1;
 }
 

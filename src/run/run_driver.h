@@ -77,12 +77,15 @@ class RunDriver final {
   /// Closes the log, halts the model processes, leaves the job and ends the progress.
   int endEarly(std::string_view ending);
   void endProgress(std::string_view ending);
+  std::string warningCountText() const;
+  void tellOfWarnings() const;
   std::vector<std::string> closingLines(const Ending& ending) const;
 
   RunState state_;
   RunLock lock_;
-  std::string filePrefix_;  ///< folder and name of the setup, without ".kdx": the beginning of the paths of the run's
-                            ///< files
+  bool isAccepted_ = false;  ///< the setup: from now on files of earlier runs are touched
+  std::string filePrefix_;   ///< folder and name of the setup, without ".kdx": the beginning of the paths of the run's
+                             ///< files
   RunConfig config_;
   std::unique_ptr<ParameterModel> parameters_;
   std::unique_ptr<ObjectiveAggregator> aggregator_;

@@ -5,6 +5,7 @@
 #include <fmt/core.h>
 
 #include "common/run_files.h"
+#include "common/version.h"
 #include "viewer/viewer.h"
 
 namespace {
@@ -16,6 +17,9 @@ Shows how the run of a setup file is going, or how it ended. It may begin before
 
   q   cancels the run, after a question
   d   leaves, as does Ctrl-C; the run goes on
+
+  --version   prints the version
+  --help      prints this text
 )";
 
 }  // namespace
@@ -24,6 +28,10 @@ int main(int argc, char** argv) {
   const std::string argument = argc == 2 ? argv[1] : "";
   if (argument == "--help") {
     fmt::print("{}{}", kUsage, kHelp);
+    return 0;
+  }
+  if (argument == "--version") {
+    fmt::print("mirevo-viewer {}\n", mirevo::programVersion());
     return 0;
   }
   if (argument.empty()) {

@@ -101,17 +101,25 @@ TEST_F(ModelRunTest, MeasureFileValuesAreTakenByTheirNumber) {
 
 TEST_F(ModelRunTest, MeasuresThatCannotBeComputedEndTheRunNamingTheSlotsFile) {
   description_.period = {{1999, 1, 1}, {1999, 12, 31}};
-  makeRunner(launcher_, 1);
-  writes("simulated.csv", series(4.0));
-  EXPECT_THAT(refusalOf([this] { evaluate(2.0); }),
-              AllOf(StartsWith("Error: No simulated data found at observation times for item No. 1 in " +
-                               folder_ / "base/simulated.csv" + "\n"),
-                    HasSubstr("read from " + folder_ / "run_Process1/simulated.csv")));
+  for (const std::string& base : {series(0.0), std::string("time,flow\n")}) {
+    folder_.write("base/simulated.csv", base);
+    makeRunner(launcher_, 1);
+    writes("simulated.csv", series(4.0));
+    EXPECT_THAT(refusalOf([this] { evaluate(2.0); }),
+                AllOf(StartsWith("Error: No simulated data found at observation times for item No. 1 in " +
+                                 folder_ / "base/simulated.csv" + "\n"),
+                      HasSubstr("read from " + folder_ / "run_Process1/simulated.csv")));
+  }
 }
 
 TEST_F(ModelRunTest, ARunThatStopsBeforeThePeriodIsAFailedEvaluation) {
   description_.period = {{2001, 1, 3}, {2001, 12, 31}};
-  for (const StatisticType statistic : {StatisticType::rootMeanSquare, StatisticType::peakDifference}) {
+  const std::string before = "time,flow\n";  // all that the file in the base folder may have
+  for (const auto& [statistic, base] : {std::pair{StatisticType::rootMeanSquare, series(0.0)},
+                                        {StatisticType::peakDifference, series(0.0)},
+                                        {StatisticType::rootMeanSquare, before},
+                                        {StatisticType::peakDifference, before}}) {
+    folder_.write("base/simulated.csv", base);
     description_.measures[0].statisticType = statistic;
     makeRunner(launcher_, 1);
     writes("simulated.csv", "time,flow\n2001-01-01,1\n2001-01-02,1\n");
@@ -120,7 +128,7 @@ TEST_F(ModelRunTest, ARunThatStopsBeforeThePeriodIsAFailedEvaluation) {
     EXPECT_EQ(result.failure->kind, Kind::resultsNotWritten);
     EXPECT_EQ(result.failure->reason, (folder_ / "run_Process1/simulated.csv") +
                                           ": item No. 1 (flow) has no value at any observation time in the evaluation "
-                                          "period, as it had before the run");
+                                          "period");
     writes("simulated.csv", series(4.0));
     EXPECT_THAT(evaluate(2.0).measureValues, ElementsAre(3.0));
   }

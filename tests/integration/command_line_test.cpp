@@ -14,21 +14,47 @@ TEST(CommandLine, WithoutASetupFileTheUsageIsShown) {
   EXPECT_EQ(result.output, "");
 }
 
-TEST(CommandLine, QuestionsAboutTheProgramAreAnswered) {
-  EXPECT_THAT(runProgram({"--version"}).output, StartsWith("Mirevo "));
-  const ProgramResult help = runProgram({"--help"});
-  EXPECT_THAT(help.output, StartsWith("Usage: Mirevo kdx-file\n"));
-  EXPECT_EQ(help.exitCode, 0);
+TEST(CommandLine, QuestionsAboutAProgramAreAnsweredAndLeaveNoFile) {
+  for (const char* program : {MIREVO_PROGRAM, MIREVO_VIEWER, MIREVO_REPORT}) {
+    const std::string name = std::filesystem::path(program).filename();
+    for (const auto& [question, answer] : {std::pair{"--version", name + " "}, {"--help", "Usage: " + name}}) {
+      const TemporaryFolder folder;
+      const std::string command = "cd '" + folder.path() + "' && exec '" + program + "' " + question;
+      const ProgramResult result = RunningProgram({"-c", command}, {}, "sh").wait();
+      EXPECT_EQ(result.exitCode, 0);
+      EXPECT_THAT(result.output, StartsWith(answer));
+      EXPECT_TRUE(std::filesystem::is_empty(folder.path()));
+    }
+  }
+}
+
+TEST(CommandLine, ARefusedSetupLeavesOneLogAndKeepsThoseOfRuns) {
+  const ModelFolder folder;
+  const std::string setup = folder.writeSetup({.option = 0});
+  ASSERT_EQ(runProgram({setup}).exitCode, 0);
+  folder.editSetup("Option = 0", "Option = 'none'");
+  for (int attempt = 0; attempt < 3; ++attempt) EXPECT_EQ(runProgram({setup}).exitCode, 1);
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("\n\nError: Unable to read keyword in section"));
+  folder.writeSetup({.option = 0});
+  ASSERT_EQ(runProgram({setup}).exitCode, 0);
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("Normal termination"));
+  EXPECT_THAT(folder.read("basin.1.log"), HasSubstr("Normal termination"));
+  EXPECT_FALSE(folder.exists("basin.2.log"));
 }
 
 TEST(CommandLine, AMissingSetupFileIsNamedOnStandardErrorAndInTheLog) {
   const TemporaryFolder folder;
   const ProgramResult result = runProgram({"ignored.kdx", (folder / "basin.kdx")});
   EXPECT_EQ(result.exitCode, 1);
-  EXPECT_THAT(result.error, StartsWith("Mirevo: Error: Unable to open " + (folder / "basin.kdx")));
+  EXPECT_THAT(result.error, HasSubstr("\nMirevo: Error: Unable to open " + (folder / "basin.kdx")));
   EXPECT_THAT(folder.read("basin.log"), HasSubstr("\n\nError: Unable to open " + (folder / "basin.kdx")));
   EXPECT_THAT(folder.read("basin.log"), HasSubstr("No such file or directory"));
-  EXPECT_FALSE(folder.exists("basin.dat"));
+  EXPECT_THAT(result.error, StartsWith("Mirevo: Ignored: \"ignored.kdx\"; "));
+  // However often it is tried, a mistyped name leaves no more than these.
+  runProgram({(folder / "basin.kdx")});
+  std::vector<std::string> left;
+  for (const auto& entry : std::filesystem::directory_iterator(folder.path())) left.push_back(entry.path().filename());
+  EXPECT_THAT(left, ::testing::UnorderedElementsAre("basin.log", "basin._spi_"));
 
   // Nothing is made beside what is no file, as under /dev.
   ASSERT_EQ(::mkfifo((folder / "pipe").c_str(), 0600), 0);

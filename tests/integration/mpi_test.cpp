@@ -57,14 +57,15 @@ TEST_F(Mpi, AJobWritesTheResultsOfAPlainRun) {
   folder_.useScript(fmt::format("{}\n{}", kSleepByParameters, kCountsJobVariables));
   for (auto [settings, processes] : cases) {
     const std::string setup = folder_.writeSetup(settings);
-    ASSERT_EQ(runProgram({setup}).exitCode, 0) << log();
+    const ProgramResult alone = runProgram({setup});
+    ASSERT_EQ(alone.exitCode, 0) << log();
     const std::string plain = folder_.read(settings.resultFile());
     settings.slots = 3;  // which counts for nothing in a job
     folder_.writeSetup(settings);
     const std::string series = folder_.read("basin_Series.dat");
     const ProgramResult job = runJob(processes, {setup});
     EXPECT_EQ(job.exitCode, 0) << job.error << log();
-    EXPECT_EQ(job.output + job.error, "");
+    EXPECT_EQ(job.output + job.error, alone.error) << "the warnings of the setup";
     EXPECT_EQ(withoutDates(folder_.read(settings.resultFile())), withoutDates(plain));
     EXPECT_EQ(occurrences(log(), "NoSimultaneousSim: taken as 1 on each worker"), 1);
     EXPECT_EQ(folder_.read("basin_Series.dat"), series);

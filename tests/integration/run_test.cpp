@@ -52,7 +52,8 @@ TEST(Optimisation, ACalibrationEndsWithItsBestSetInLogResultsAndModelFolder) {
 TEST(Optimisation, OfEqualSetsTheResultsNameTheOneThatTheSearchTookAndUnusedParametersAreWarnedOf) {
   const ModelFolder folder;
   folder.write("model/parameters.tpl", "!\na = 4\nc = !c!\n# 1!c!\n");
-  ASSERT_EQ(runProgram({folder.writeSetup({.maxEvaluations = 10})}).exitCode, 0);
+  const ProgramResult run = runProgram({folder.writeSetup({.maxEvaluations = 10})});
+  ASSERT_EQ(run.exitCode, 0);
   const std::string results = folder.read("basin_Optimisation.dat");
   const auto rows = readDataTable(results).rows;
   ASSERT_EQ(rows.size(), 11U);
@@ -65,6 +66,26 @@ TEST(Optimisation, OfEqualSetsTheResultsNameTheOneThatTheSearchTookAndUnusedPara
   }
   EXPECT_THAT(log, Not(HasSubstr("parameter \"c\" stands in no template"))) << "a fixed one";
   EXPECT_THAT(log, HasSubstr("parameters.tpl:4: the placeholder of parameter \"c\""));
+  // Whoever does not read the log is told, too.
+  const std::string first = "the variable parameter \"a\" stands in no template: its value does not reach the model";
+  const std::string report = folder.read("basin_Report.html");
+  EXPECT_EQ(run.error, fmt::format("Mirevo: 3 warnings in {}; the first: {}\n", folder / "basin.log", first));
+  EXPECT_THAT(folder.read("basin._spi_"), HasSubstr("\nMESSAGWarning: " + first + "\n"));
+  EXPECT_THAT(report, HasSubstr("Warning: the variable parameter \\\"a\\\" stands in no template"));
+  EXPECT_THAT(log, HasSubstr("\n3 warnings: the lines above that begin with"));
+}
+
+TEST(Scenarios, ASetupThatSelectsNothingSaysSo) {
+  const ModelFolder folder;
+  for (const auto& [from, to] :
+       {std::pair{"Option = 2", "Option = 5"}, {"Use_Surrogate_Model = 0", "Use_Surrogate_Model = 2"}}) {
+    const std::string setup = folder.writeSetup({});
+    folder.editSetup(from, to);
+    const ProgramResult run = runProgram({setup});
+    EXPECT_EQ(run.exitCode, 0);
+    EXPECT_THAT(run.error, StartsWith("Mirevo: Nothing was run: the setup selects no task or no search\n"));
+    EXPECT_THAT(folder.read("basin.log"), EndsWith("\n\nNormal termination\n"));
+  }
 }
 
 TEST(Optimisation, ResultsAreTheSameBitsWhateverOrderTheModelRunsEndIn) {

@@ -1,6 +1,9 @@
 #include "parameters/parameter_model.h"
 
+#include <algorithm>
 #include <cmath>
+#include <numeric>
+#include <random>
 #include <tuple>
 
 #include <fmt/format.h>
@@ -72,20 +75,48 @@ TEST(ParameterModel, NamesWhatItRefuses) {
                               "in equation parser\ncolumn 1: no parameter is called \"b\"")));
 }
 
-/// By one swap and one scan after the other: not the order that puts the first free parameter first.
+using Named = std::vector<std::vector<std::size_t>>;  // by each parameter, from 0
+
+/// By one swap and one scan after the other.
+std::vector<int> orderStepByStep(const Named& named) {
+  std::vector<int> order;
+  for (std::size_t i = 0; i < named.size(); ++i) order.push_back(static_cast<int>(i) + 1);
+  const auto namesLater = [&](std::size_t p) {
+    const std::vector<std::size_t>& list = named[static_cast<std::size_t>(order[p]) - 1];
+    return std::any_of(order.begin() + static_cast<std::ptrdiff_t>(p) + 1, order.end(), [&](int number) {
+      return std::find(list.begin(), list.end(), static_cast<std::size_t>(number) - 1) != list.end();
+    });
+  };
+  for (std::size_t p = 0; p < order.size();) {
+    const bool isMoved = namesLater(p);
+    for (std::size_t q = p; namesLater(q); ++q) std::swap(order[q], order[q + 1]);
+    p = isMoved ? 0 : p + 1;
+  }
+  return order;
+}
+
+/// Not the order that puts the first free parameter first.
 TEST(ParameterModel, OrdersAsStepByStep) {
-  using Named = std::vector<std::vector<std::size_t>>;  // by each parameter, from 0
-  const std::tuple<Named, std::vector<int>> cases[] = {
-      {{{2}, {2}, {}}, {3, 2, 1}},
-      {{{1}, {2}, {3}, {4}, {}}, {5, 4, 3, 2, 1}},
-      {{{4}, {}, {4}, {4}, {}, {}, {}}, {2, 5, 4, 3, 1, 6, 7}},
-      {{{4}, {}, {5}, {5}, {}, {}, {}}, {2, 5, 1, 6, 4, 3, 7}},
-      {{{}, {5}, {}, {5}, {}, {}, {0}}, {1, 3, 5, 6, 4, 2, 7}},
-      {{{4}, {4, 5}, {}, {1}, {5}, {2}, {0, 3}}, {3, 6, 5, 1, 2, 4, 7}}};
-  for (const auto& [named, order] : cases) {
+  const auto order = [](const Named& named) {
     std::vector<ModelParameter> parameters;
     for (const auto& list : named) parameters.push_back(list.empty() ? variable("v") : dependent("d", "v"));
-    EXPECT_EQ(OrderDependentParameters(parameters, named), order);
+    return OrderDependentParameters(parameters, named);
+  };
+  EXPECT_EQ(order({{4}, {4, 5}, {}, {1}, {5}, {2}, {0, 3}}), (std::vector<int>{3, 6, 5, 1, 2, 4, 7}));
+  std::mt19937 random(1);
+  for (std::size_t round = 0; round < 400; ++round) {
+    std::vector<std::size_t> rank(round < 396 ? 2 + random() % 12 : 90);  // each names those of a lower rank
+    std::iota(rank.begin(), rank.end(), std::size_t{0});
+    if (round % 2 == 0) std::shuffle(rank.begin(), rank.end(), random);
+    if (round % 2 == 1) std::reverse(rank.begin(), rank.end());
+    const std::size_t sparse = 1 + random() % rank.size();
+    Named named(rank.size());
+    for (std::size_t i = 0; i < named.size(); ++i) {
+      for (std::size_t j = 0; j < named.size(); ++j) {
+        if (rank[j] < rank[i] && (random() % sparse == 0 || rank[j] + 1 == rank[i])) named[i].push_back(j);
+      }
+    }
+    EXPECT_EQ(order(named), orderStepByStep(named)) << ::testing::PrintToString(named);
   }
 }
 

@@ -62,6 +62,20 @@ TEST(BuildSearchSpace, TransformsTheVariableParametersInOrder) {
             (std::vector<double>{5, std::exp(std::log(1e-4)), -0.1}));
 }
 
+/// exp(ln(x)) differs from x by up to two units in the last place for these values.
+TEST(ToModelScale, ALogarithmicParameterKeepsAGivenValue) {
+  ModelParameter k = parameter("k", 10, 0.7, 1e7, TransformationType::logarithmic);
+  k.givenValues = {5, 2000, -1};  // the last is refused elsewhere
+  const SearchSpace space = BuildSearchSpace(std::vector<ModelParameter>{parameter("x", 10, 0, 20), k});
+  for (const double value : {10.0, 1e7, 0.7, 5.0, 2000.0}) {
+    EXPECT_EQ(ToModelScale(space, std::vector<double>{5, std::log(value)})[1], value);
+  }
+  const double between = std::nextafter(std::log(5.0), 0.0);
+  EXPECT_EQ(ToModelScale(space, std::vector<double>{std::log(10.0), between}),
+            (std::vector<double>{std::log(10.0), std::exp(between)}));
+  EXPECT_TRUE(std::isnan(toModelScale(space, 1, std::numeric_limits<double>::quiet_NaN())));
+}
+
 TEST(BuildSearchSpace, RefusesInItsOrder) {
   constexpr auto kLog = TransformationType::logarithmic;
   const std::tuple<std::vector<ModelParameter>, const char*> cases[] = {

@@ -33,5 +33,22 @@ TEST(CommandLine, SwitchesAreNotCountedAndTheLastOrdinaryArgumentWins) {
   }
 }
 
+TEST(CommandLine, WhatHasNoEffectIsNamed) {
+  const std::pair<std::vector<std::string>, const char*> cases[] = {
+      {{"a.kdx", "//QMON"}, ""},
+      {{"//foo", "a.kdx", "//bar"}, "Ignored: \"//foo\", \"//bar\"; the only switch is //qmon\n"},
+      {{"-n", "4", "a.kdx"}, "Ignored: \"-n\", \"4\"; the setup file is the last argument, \"a.kdx\"\n"},
+      {{"a.kdx", "a.kdx"}, "Ignored: \"a.kdx\"; the setup file is the last argument, \"a.kdx\"\n"},
+      {{"//x", "a.kdx", "b.kdx"},
+       "Ignored: \"//x\"; the only switch is //qmon\nIgnored: \"a.kdx\"; the setup file is the last argument, "
+       "\"b.kdx\"\n"},
+  };
+  for (const auto& [arguments, sentences] : cases) {
+    std::string found;
+    for (const std::string& sentence : CommandLine(arguments).ignored()) found += sentence + "\n";
+    EXPECT_EQ(found, sentences);
+  }
+}
+
 }  // namespace
 }  // namespace mirevo

@@ -22,25 +22,54 @@ constexpr double kWarnAboveCorrelation = 0.95;
 /// Smallest squared length of a column of length 1 that must remain after projecting out the columns before it.
 /// Differences of a model's output have no more than 6 to 8 digits, so that anything smaller is noise.
 constexpr double kSmallestPivot = 1.0e-12;
+/// What remains of a dependent column is the rounding of both, whose squares scatter by less than this factor.
+constexpr double kNoiseFactor = 4.0;
 
 /// W^(1/2) J and W^(1/2) r, without the rows that have no residual.
 struct WeightedModel {
   std::vector<std::vector<double>> columns;
   std::vector<double> residuals;
+  std::vector<double> noise;  ///< expected squared length of what is rounding in a column
+  std::size_t withoutDerivative = 0;
+  double lagOne = kNaN;
 };
 
 WeightedModel weighRows(const LinearisedModel& model) {
   assert(model.weights.empty() || model.weights.size() == model.residuals.size());
   WeightedModel weighted;
   weighted.columns.resize(model.jacobian.size());
+  weighted.noise.resize(model.jacobian.size(), 0.0);
+  std::vector<std::size_t> known;
+  for (std::size_t j = 0; j < model.jacobian.size(); ++j) {
+    const std::vector<double>& column = model.jacobian[j];
+    if (std::any_of(column.begin(), column.end(), [](double value) { return std::isfinite(value); }))
+      known.push_back(j);
+  }
+  double products = 0.0;
+  double squares = 0.0;
+  std::size_t before = model.residuals.size();  // the last row that was used
   for (std::size_t i = 0; i < model.residuals.size(); ++i) {
     if (!std::isfinite(model.residuals[i])) continue;
+    if (!std::all_of(known.begin(), known.end(), [&](std::size_t j) { return std::isfinite(model.jacobian[j][i]); })) {
+      ++weighted.withoutDerivative;
+      continue;
+    }
     const double root = model.weights.empty() ? 1.0 : std::sqrt(model.weights[i]);
-    weighted.residuals.push_back(root * model.residuals[i]);
+    const bool follows = before + 1 == i && (model.series.empty() || model.series[before] == model.series[i]);
+    const double residual = root * model.residuals[i];
+    if (follows) products += weighted.residuals.back() * residual;
+    squares += residual * residual;
+    before = i;
+    weighted.residuals.push_back(residual);
     for (std::size_t j = 0; j < model.jacobian.size(); ++j) {
       weighted.columns[j].push_back(root * model.jacobian[j][i]);
+      if (model.units.empty()) continue;
+      // The difference of two values, each rounded to its unit, has the variance unit^2 / 6.
+      const double rounding = root * model.units[i] / model.widths[j];
+      weighted.noise[j] += rounding * rounding / 6.0;
     }
   }
+  if (squares > 0.0) weighted.lagOne = products / squares;
   return weighted;
 }
 
@@ -75,16 +104,18 @@ std::vector<double> gramMatrix(const std::vector<std::vector<double>>& columns, 
 }
 
 /// Factorises the Gram matrix in place. Returns the 0-based index of the first column that depends on those before it,
-/// or k when there is none.
-std::size_t factorise(std::vector<double>& gram, std::size_t k) {
+/// or k when there is none. `noise` is the share of rounding in the squared length of each column.
+std::size_t factorise(std::vector<double>& gram, std::size_t k, std::span<const double> noise) {
   const int n = static_cast<int>(k);
   int info = 0;
   useOneLapackThread();
   dpotrf_("U", &n, gram.data(), &n, &info);
   const std::size_t sound = info > 0 ? static_cast<std::size_t>(info - 1) : k;
+  double sum = 0.0;
   for (std::size_t i = 0; i < sound; ++i) {
     const double pivot = gram[i * k + i];
-    if (!(pivot * pivot > kSmallestPivot)) return i;
+    sum += noise[i];
+    if (!(pivot * pivot > std::max(kSmallestPivot, i == 0 ? 0.0 : kNoiseFactor * sum))) return i;
   }
   return sound;
 }
@@ -105,7 +136,9 @@ std::vector<double> invertWhatCanBe(const WeightedModel& weighted, std::span<con
   for (;;) {
     const std::size_t k = result.kept.size();
     gram = gramMatrix(weighted.columns, result.kept);
-    const std::size_t dependent = k == 0 ? 0 : factorise(gram, k);
+    std::vector<double> noise;
+    for (const std::size_t j : result.kept) noise.push_back(weighted.noise[j] / (lengths[j] * lengths[j]));
+    const std::size_t dependent = k == 0 ? 0 : factorise(gram, k, noise);
     if (dependent == k) break;
     result.leftOut.push_back(
         {result.kept[dependent], "its effect cannot be told from that of the parameters before it"});
@@ -122,12 +155,24 @@ std::vector<double> invertWhatCanBe(const WeightedModel& weighted, std::span<con
   return gram;
 }
 
+/// The factor is that of a mean of residuals that follow one another as in a first-order autoregression.
+std::string lagOneText(double lagOne) {
+  constexpr double kHardlyAny = 0.1;
+  if (!(lagOne > kHardlyAny) || lagOne >= 1.0) return fmt::format("Lag-1 correlation of the residuals: {:.3f}", lagOne);
+  return fmt::format(
+      "Lag-1 correlation of the residuals: {:.3f}, which makes the standard deviations about {:.1f} times "
+      "too small, and the limits as much too narrow",
+      lagOne, std::sqrt((1.0 + lagOne) / (1.0 - lagOne)));
+}
+
 }  // namespace
 
 ParameterCovariance parameterCovariance(const LinearisedModel& model) {
   WeightedModel weighted = weighRows(model);
   ParameterCovariance result;
   result.observationCount = weighted.residuals.size();
+  result.withoutDerivative = weighted.withoutDerivative;
+  result.lagOne = weighted.lagOne;
   std::vector<double> lengths;
   for (std::vector<double>& column : weighted.columns) {
     const bool isKnown = std::all_of(column.begin(), column.end(), [](double value) { return std::isfinite(value); });
@@ -171,7 +216,7 @@ std::vector<ParameterLimits> parameterLimits(const ParameterCovariance& covarian
     const double reach = covariance.tQuantile * deviation;
     // The limits of an integer parameter are not rounded to integers: they are those of a continuous quantity.
     if (space.transformation[j] == TransformationType::logarithmic) {
-      const double value = std::exp(set[j]);
+      const double value = toModelScale(space, j, set[j]);
       limits.push_back({value, value * deviation, std::exp(set[j] - reach), std::exp(set[j] + reach)});
     } else {
       limits.push_back({set[j], deviation, set[j] - reach, set[j] + reach});
@@ -192,7 +237,8 @@ std::vector<DataTable> covarianceTables(const ParameterCovariance& covariance, c
       matrixTable(run_files::kCorrelation, "Correlation of the parameters", names, covariance.correlation));
   DataTable& limits = tables.emplace_back();
   limits.file = run_files::kParameterLimits;
-  limits.headLines = {"Estimate, standard deviation and 95 % limits of each parameter, model scale"};
+  limits.headLines = {"Estimate, standard deviation and 95 % limits of each parameter, model scale",
+                      lagOneText(covariance.lagOne)};
   limits.columns = {"Parameter", "Estimate", "StandardDeviation", "Lower95", "Upper95", "LeftOut"};
   const std::vector<ParameterLimits> found = parameterLimits(covariance, space, set);
   for (std::size_t i = 0; i < names.size(); ++i) {
@@ -238,7 +284,13 @@ std::vector<std::string> formatCovariance(const ParameterCovariance& covariance,
     lines.emplace_back("Warning: No covariance matrix: there must be more observations than parameters");
     return lines;
   }
+  if (covariance.withoutDerivative > 0) {
+    lines.push_back(fmt::format(
+        "Warning: {} observations are left out of the covariance matrix: a perturbed run has no value there",
+        covariance.withoutDerivative));
+  }
   lines.push_back(fmt::format("Standard error of a residual: {:.6g}", std::sqrt(covariance.errorVariance)));
+  lines.push_back(lagOneText(covariance.lagOne));
 
   std::vector<std::string> names;
   for (const std::size_t j : covariance.kept) names.push_back(space.names[j]);

@@ -15,6 +15,11 @@ struct LinearisedModel {
   std::vector<double> residuals;              ///< r, simulated minus observed, n; rows with a NaN are left out
   std::vector<double> weights;                ///< the diagonal of W, n; all 1 when empty
   std::vector<std::vector<double>> jacobian;  ///< J by columns: p columns of n derivatives on the search scale
+  std::vector<std::size_t> series = {};       ///< the series of each row, n; all the same when empty
+  /// The unit in which each simulated value is printed, n, and the widths of the differences that gave the columns, p:
+  /// from both follows how much of a column is rounding. None when empty.
+  std::vector<double> units = {};
+  std::vector<double> widths = {};
 };
 
 /// A parameter without a variance, and why.
@@ -27,17 +32,20 @@ struct LeftOutParameter {
 struct ParameterCovariance {
   std::vector<std::size_t> kept;  ///< k parameters, ascending; the matrices and vectors below have their order
   std::vector<LeftOutParameter> leftOut;
-  std::size_t observationCount = 0;  ///< n, rows with a NaN not counted
-  std::size_t degreesOfFreedom = 0;  ///< n - k
-  double errorVariance = 0.0;        ///< s^2; NaN, with all that follows, when there are no degrees of freedom
+  std::size_t observationCount = 0;   ///< n, rows with a NaN not counted
+  std::size_t withoutDerivative = 0;  ///< observations for which a perturbed run has no value
+  std::size_t degreesOfFreedom = 0;   ///< n - k
+  double errorVariance = 0.0;         ///< s^2; NaN, with all that follows, when there are no degrees of freedom
   std::vector<std::vector<double>> covariance;
   std::vector<std::vector<double>> correlation;
   std::vector<double> standardDeviations;
   double tQuantile = 0.0;  ///< 97.5 % quantile of Student's t
+  double lagOne = 0.0;     ///< correlation of each weighted residual with the next of its series; NaN if there is none
 };
 
-/// By Cholesky factorisation of the scaled matrix (DPOTRF, DPOTRI). A parameter whose column is zero, not finite, or a
-/// linear combination of the columns before it is left out, with the reason.
+/// By Cholesky factorisation of the scaled matrix (DPOTRF, DPOTRI). A parameter whose column is zero, has no finite
+/// entry, or is, to within the rounding of the simulated values, a linear combination of the columns before it is left
+/// out, with the reason. A row that lacks a derivative by another parameter is left out.
 ParameterCovariance parameterCovariance(const LinearisedModel& model);
 
 /// One parameter on the model scale. The limits are computed on the search scale and transformed back; the standard

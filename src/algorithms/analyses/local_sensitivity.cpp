@@ -2,13 +2,17 @@
 
 #include <algorithm>
 #include <cassert>
+#include <charconv>
 #include <cmath>
 #include <limits>
 #include <numeric>
+#include <utility>
 
 #include <fmt/core.h>
 
 #include "common/run_files.h"
+#include "common/text.h"
+#include "parameters/value_format.h"
 
 namespace mirevo {
 
@@ -47,8 +51,10 @@ Step wantedStep(const SensitivitySettings& settings, const SearchSpace& space, s
   }
   if (type == TransformationType::integer && step.extent > 0.0) {
     step.up = step.down = std::max(1.0, std::round(step.up));
-    step.roomUp = std::floor(step.roomUp);
-    step.roomDown = std::floor(step.roomDown);
+    // 3.3 - 1.3 is 1.9999999999999998, but two steps.
+    constexpr double kRounding = 1.0e-8;
+    step.roomUp = std::floor(step.roomUp + kRounding);
+    step.roomDown = std::floor(step.roomDown + kRounding);
   }
   return step;
 }
@@ -63,7 +69,7 @@ ParameterDifference planDifference(const Step& step, bool central, std::size_t j
   const double x = sets.front()[j];
   ParameterDifference difference;
   difference.extent = step.extent;
-  if (step.up == 0.0) {
+  if (step.up == 0.0 || step.roomUp + step.roomDown == 0.0) {
     difference.problem = step.roomUp + step.roomDown == 0.0
                              ? "its bounds are equal"
                              : "its value is 0, and the perturbation is a fraction of it";
@@ -76,16 +82,61 @@ ParameterDifference planDifference(const Step& step, bool central, std::size_t j
     difference.plus = addSet(x + step.up);
   } else if (fitsUp || (!fitsDown && step.roomUp >= step.roomDown && step.roomUp > 0.0)) {
     difference.plus = addSet(x + std::min(step.up, step.roomUp));
-  } else if (step.roomDown > 0.0) {
-    difference.minus = addSet(x - std::min(step.down, step.roomDown));
   } else {
-    difference.problem = "its bounds are equal";
-    return difference;
+    difference.minus = addSet(x - std::min(step.down, step.roomDown));
+  }
+  if (central && !difference.isCentral()) {
+    difference.warnings.push_back(fmt::format("its {} bound leaves no room for the step: the difference is one-sided",
+                                              difference.minus == 0 ? "lower" : "upper"));
   }
   // The width after rounding, which is that of the sets that are run.
   difference.width = sets[difference.plus][j] - sets[difference.minus][j];
+  difference.widthBelow = x - sets[difference.minus][j];
+  difference.widthAbove = sets[difference.plus][j] - x;
   if (!(difference.width > 0.0)) difference.problem = "the perturbation is too small to change its value";
   return difference;
+}
+
+/// The search-scale value of what the model reads for a value of parameter j; empty if the field holds no number.
+std::optional<double> searchValueAsWritten(const SearchSpace& space, std::size_t j, double value, int fieldWidth) {
+  const double modelValue = toModelScale(space, j, value);
+  const std::optional<double> written = valueAsWritten(modelValue, fieldWidth);
+  if (!written || *written == modelValue) return written ? std::optional(value) : std::nullopt;
+  if (space.transformation[j] != TransformationType::logarithmic) return written;
+  return *written > 0.0 ? std::optional(std::log(*written)) : std::nullopt;
+}
+
+/// Takes the width of a difference as the model gets it from a field of this many characters.
+void takeWidthAsWritten(const SearchSpace& space, std::size_t j, int fieldWidth, std::span<const ParameterSet> sets,
+                        ParameterDifference& difference) {
+  constexpr double kWorthAWarning = 0.01;
+  constexpr double kExact = 1.0e-9;  // a field that holds 15 digits: what it cuts is no more than a rounding error
+  const double minusValue = sets[difference.minus][j];
+  const double plusValue = sets[difference.plus][j];
+  const std::optional<double> minus = searchValueAsWritten(space, j, minusValue, fieldWidth);
+  const std::optional<double> plus = searchValueAsWritten(space, j, plusValue, fieldWidth);
+  const double wanted = difference.width;
+  difference.width = minus && plus ? *plus - *minus : 0.0;
+  if (std::abs(difference.width - wanted) <= kExact * wanted) {
+    difference.width = wanted;
+    return;
+  }
+  if (difference.isCentral()) {
+    const double base = searchValueAsWritten(space, j, sets.front()[j], fieldWidth).value_or(kNaN);
+    difference.widthBelow = minus ? base - *minus : kNaN;
+    difference.widthAbove = plus ? *plus - base : kNaN;
+  }
+  const std::string fields =
+      fmt::format("in its field of {} characters {} is written as \"{}\" and {} as \"{}\"", fieldWidth,
+                  formatReal(toModelScale(space, j, minusValue)),
+                  trim(FormatValueForPlaceholder(toModelScale(space, j, minusValue), fieldWidth)),
+                  formatReal(toModelScale(space, j, plusValue)),
+                  trim(FormatValueForPlaceholder(toModelScale(space, j, plusValue), fieldWidth)));
+  if (difference.width == 0.0) {
+    difference.problem = fields;
+  } else if (std::abs(difference.width - wanted) > kWorthAWarning * wanted) {
+    difference.warnings.push_back(fields + "; the difference is that of the values as written");
+  }
 }
 
 SensitivityTable tabulate(const PerturbationPlan& plan, std::span<const EvaluationResult> results,
@@ -118,22 +169,27 @@ SensitivityTable tabulate(const PerturbationPlan& plan, std::span<const Evaluati
 
 void noteFailures(PerturbationPlan& plan, std::span<const EvaluationResult> results) {
   for (ParameterDifference& difference : plan.differences) {
-    for (const std::size_t set : {difference.minus, difference.plus}) {
-      if (!difference.problem.empty() || results[set].ok()) continue;
-      difference.problem = fmt::format("evaluation {} failed: {}", results[set].number, results[set].failure->reason);
+    const bool hasBelow = results[difference.minus].ok();
+    const bool hasAbove = results[difference.plus].ok();
+    if (!difference.problem.empty() || (hasBelow && hasAbove)) continue;
+    const EvaluationResult& failed = results[hasBelow ? difference.plus : difference.minus];
+    const std::string reason = fmt::format("evaluation {} failed: {}", failed.number, failed.failure->reason);
+    const double width = hasBelow ? difference.widthBelow : difference.widthAbove;
+    if (!difference.isCentral() || hasBelow == hasAbove || !results.front().ok() || !(std::abs(width) > 0.0)) {
+      difference.problem = reason;
+      continue;
     }
+    (hasBelow ? difference.plus : difference.minus) = 0;
+    difference.width = width;
+    difference.warnings.push_back(reason + ": the difference is one-sided");
   }
 }
 
-std::vector<std::size_t> rank(std::span<const double> composite) {
-  std::vector<std::size_t> order(composite.size());
-  std::iota(order.begin(), order.end(), std::size_t{0});
-  std::stable_sort(order.begin(), order.end(), [&](std::size_t a, std::size_t b) {
-    if (std::isnan(composite[a]) || std::isnan(composite[b]))
-      return !std::isnan(composite[a]) && std::isnan(composite[b]);
-    return composite[a] > composite[b];
-  });
-  return order;
+/// The difference quotient of an output, by the base value where one side of a central difference has none.
+double quotient(const ParameterDifference& difference, double below, double base, double above) {
+  const double central = (above - below) / difference.width;
+  if (!difference.isCentral() || !std::isnan(central)) return central;
+  return std::isnan(below) ? (above - base) / difference.widthAbove : (base - below) / difference.widthBelow;
 }
 
 void appendTable(std::vector<std::string>& lines, const std::string& title, std::span<const std::string> outputs,
@@ -177,31 +233,45 @@ const SettingSection<SensitivitySettings>& localSensitivitySection() {
 }
 
 PerturbationPlan planPerturbations(const SensitivitySettings& settings, const SearchSpace& space,
-                                   std::span<const double> base) {
+                                   std::span<const double> base, std::span<const int> fieldWidths) {
   PerturbationPlan plan;
   plan.sets.emplace_back(base.begin(), base.end());
   for (std::size_t j = 0; j < space.size(); ++j) {
     const Step step = wantedStep(settings, space, base, j);
     plan.differences.push_back(planDifference(step, settings.differencing == Differencing::central, j, plan.sets));
+    const int fieldWidth = j < fieldWidths.size() ? fieldWidths[j] : 0;
+    if (fieldWidth == 0 || !plan.differences.back().problem.empty()) continue;
+    takeWidthAsWritten(space, j, fieldWidth, plan.sets, plan.differences.back());
   }
   return plan;
+}
+
+std::vector<int> ofVariableParameters(std::span<const int> fieldWidths, std::span<const ModelParameter> parameters) {
+  std::vector<int> widths;
+  for (std::size_t i = 0; i < fieldWidths.size(); ++i) {
+    if (parameters[i].parameterType == ParameterType::variable) widths.push_back(fieldWidths[i]);
+  }
+  return widths;
 }
 
 bool hasRoomForStep(const SensitivitySettings& settings, const SearchSpace& space, std::size_t j) {
   constexpr double kRounding = 1.0 + 1.0e-12;
   const Step step = wantedStep(settings, space, space.initial, j);
+  // Equal bounds leave no parameter to perturb; it is left out by name.
+  if (step.roomUp + step.roomDown == 0.0) return true;
   return step.up <= step.roomUp * kRounding || step.down <= step.roomDown * kRounding;
 }
 
-LocalSensitivity localSensitivity(const SensitivitySettings& settings, const SearchSpace& space, Evaluator& evaluator) {
+LocalSensitivity localSensitivity(const SensitivitySettings& settings, const SearchSpace& space, Evaluator& evaluator,
+                                  std::span<const int> fieldWidths) {
   LocalSensitivity sensitivity;
-  sensitivity.plan = planPerturbations(settings, space, space.initial);
+  sensitivity.plan = planPerturbations(settings, space, space.initial, fieldWidths);
   sensitivity.results = evaluator.evaluateParameterSets(sensitivity.plan.sets, DispatchMode::task);
   noteFailures(sensitivity.plan, sensitivity.results);
   sensitivity.measures = tabulate(sensitivity.plan, sensitivity.results, &EvaluationResult::measureValues);
   sensitivity.objectives = tabulate(sensitivity.plan, sensitivity.results, &EvaluationResult::objectiveValues);
   const bool hasObjectives = !sensitivity.objectives.base.empty();
-  sensitivity.ranking = rank(hasObjectives ? sensitivity.objectives.composite : sensitivity.measures.composite);
+  sensitivity.ranking = ranked(hasObjectives ? sensitivity.objectives.composite : sensitivity.measures.composite);
   return sensitivity;
 }
 
@@ -215,12 +285,76 @@ std::vector<std::vector<double>> differenceColumns(const PerturbationPlan& plan,
     const std::vector<double>& minus = outputs[difference.minus];
     const std::vector<double>& plus = outputs[difference.plus];
     std::vector<double> column(count, kNaN);
+    const std::vector<double>& base = outputs.front();
     if (difference.problem.empty() && minus.size() == count && plus.size() == count) {
-      for (std::size_t i = 0; i < count; ++i) column[i] = (plus[i] - minus[i]) / difference.width;
+      for (std::size_t i = 0; i < count; ++i) {
+        column[i] = quotient(difference, minus[i], base.size() == count ? base[i] : kNaN, plus[i]);
+      }
     }
     columns.push_back(std::move(column));
   }
   return columns;
+}
+
+std::vector<double> printedUnits(std::span<const double> values, std::span<const std::vector<double>> others) {
+  constexpr int kSingleDigits = 9;
+  int mostDigits = 0;
+  int lowestPlace = std::numeric_limits<int>::max();
+  bool isSingle = true;
+  const auto take = [&](double value) {
+    if (!std::isfinite(value) || value == 0.0) return;
+    char text[32];
+    const std::string_view shortest(
+        text, std::to_chars(std::begin(text), std::end(text), std::abs(value), std::chars_format::scientific).ptr);
+    const std::size_t mark = shortest.find('e');
+    const int digits = static_cast<int>(mark) - (mark > 1 ? 1 : 0);
+    const int exponent = static_cast<int>(std::floor(std::log10(std::abs(value))));
+    mostDigits = std::max(mostDigits, digits);
+    lowestPlace = std::min(lowestPlace, exponent - digits + 1);
+    isSingle = isSingle && static_cast<double>(static_cast<float>(value)) == value;
+  };
+  std::for_each(values.begin(), values.end(), take);
+  for (const std::vector<double>& more : others) std::for_each(more.begin(), more.end(), take);
+  std::vector<double> units;
+  for (const double value : values) {
+    const double size = std::abs(value);
+    if (mostDigits == 0 || !std::isfinite(value)) {
+      units.push_back(0.0);
+    } else if (isSingle && mostDigits > kSingleDigits) {
+      units.push_back(size * static_cast<double>(std::numeric_limits<float>::epsilon()));
+    } else {
+      const double ofDigits = size > 0.0 ? std::pow(10.0, std::floor(std::log10(size)) - mostDigits + 1) : 0.0;
+      units.push_back(std::max(std::pow(10.0, lowestPlace), ofDigits));
+    }
+  }
+  return units;
+}
+
+std::vector<std::size_t> ranked(std::span<const double> values) {
+  std::vector<std::size_t> order(values.size());
+  std::iota(order.begin(), order.end(), std::size_t{0});
+  std::stable_sort(order.begin(), order.end(), [&](std::size_t a, std::size_t b) {
+    if (std::isnan(values[a]) || std::isnan(values[b])) return !std::isnan(values[a]) && std::isnan(values[b]);
+    return values[a] > values[b];
+  });
+  return order;
+}
+
+void takeObservations(const LinearisedModel& model, LocalSensitivity& sensitivity) {
+  sensitivity.ofObservations.clear();
+  for (std::size_t j = 0; j < model.jacobian.size(); ++j) {
+    const double extent = sensitivity.plan.differences[j].extent;
+    double squares = 0.0;
+    std::size_t count = 0;
+    for (std::size_t i = 0; i < model.residuals.size(); ++i) {
+      const double change = model.jacobian[j][i] * extent;
+      if (!std::isfinite(model.residuals[i]) || !std::isfinite(change)) continue;
+      squares += (model.weights.empty() ? 1.0 : model.weights[i]) * change * change;
+      ++count;
+    }
+    sensitivity.ofObservations.push_back(count == 0 ? kNaN : std::sqrt(squares / static_cast<double>(count)));
+  }
+  sensitivity.ranking = ranked(sensitivity.ofObservations);
 }
 
 std::optional<LinearisedModel> linearise(const PerturbationPlan& plan,
@@ -232,6 +366,7 @@ std::optional<LinearisedModel> linearise(const PerturbationPlan& plan,
   for (std::size_t i = 0; i < base.size(); ++i) model.residuals.push_back(base[i] - observedValues[i]);
   model.weights = std::move(weights);
   model.jacobian = differenceColumns(plan, simulatedValues);
+  for (const ParameterDifference& difference : plan.differences) model.widths.push_back(difference.width);
   return model;
 }
 
@@ -240,7 +375,8 @@ std::vector<DataTable> sensitivityTables(const LocalSensitivity& sensitivity, co
   table.file = run_files::kSensitivities;
   table.headLines = {
       "Derivatives on the search scale, and dimensionless: times the extent of the parameter, over the "
-      "size of the output; the composite is their root mean square over all outputs of a kind"};
+      "size of the output; the composite is their root mean square over all outputs of a kind, or, of the "
+      "derivatives times the extent, over all weighted observations"};
   table.columns = {"Parameter", "Kind", "Output", "Derivative", "Scaled", "Composite", "Problem"};
   for (std::size_t j = 0; j < names.parameters.size(); ++j) {
     const auto add = [&](const std::string& kind, const SensitivityTable& found, std::span<const std::string> outputs) {
@@ -251,6 +387,9 @@ std::vector<DataTable> sensitivityTables(const LocalSensitivity& sensitivity, co
     };
     add("measure", sensitivity.measures, names.measures);
     add("objective", sensitivity.objectives, names.objectives);
+    if (sensitivity.ofObservations.empty()) continue;
+    table.rows.push_back({names.parameters[j], std::string("observations"), std::string("all"), kNaN, kNaN,
+                          sensitivity.ofObservations[j], sensitivity.plan.differences[j].problem});
   }
   return {std::move(table)};
 }
@@ -259,8 +398,13 @@ std::vector<std::string> formatSensitivity(const LocalSensitivity& sensitivity, 
   std::vector<std::string> lines{"Local sensitivity analysis"};
   for (std::size_t j = 0; j < names.parameters.size(); ++j) {
     const std::string& problem = sensitivity.plan.differences[j].problem;
-    if (problem.empty()) continue;
-    lines.push_back(fmt::format("Warning: Parameter {} has no derivatives: {}", names.parameters[j], problem));
+    if (!problem.empty()) {
+      lines.push_back(fmt::format("Warning: Parameter {} has no derivatives: {}", names.parameters[j], problem));
+      continue;
+    }
+    for (const std::string& warning : sensitivity.plan.differences[j].warnings) {
+      lines.push_back(fmt::format("Warning: Parameter {}: {}", names.parameters[j], warning));
+    }
   }
   const auto appendBoth = [&](const std::string& what, const SensitivityTable& table,
                               std::span<const std::string> outputs) {
@@ -268,20 +412,35 @@ std::vector<std::string> formatSensitivity(const LocalSensitivity& sensitivity, 
     appendTable(lines, "Derivatives of " + what, outputs, names.parameters, table.derivatives);
     appendTable(lines, "Scaled sensitivities of " + what, outputs, names.parameters, table.scaled);
   };
+  for (const EvaluationResult& result : sensitivity.results) {
+    constexpr double kRounding = 1.0 - 1.0e-6;  // of the statistics, in 32 bits
+    const EvaluationResult& base = sensitivity.results.front();
+    // A negative aggregate is no measure of a misfit.
+    if (!base.ok() || !result.ok() || !(result.aggregate >= 0.0 && result.aggregate < base.aggregate * kRounding)) {
+      continue;
+    }
+    lines.push_back(
+        fmt::format("Warning: evaluation {} fits better than the base set: its aggregate is {}, not {}; the "
+                    "base set is not the best, and its derivatives and deviations mislead",
+                    result.number, formatReal(result.aggregate), formatReal(base.aggregate)));
+  }
   appendBoth("output measures", sensitivity.measures, names.measures);
   appendBoth("objective functions", sensitivity.objectives, names.objectives);
 
   const bool hasObjectives = !names.objectives.empty();
-  const std::vector<double>& composite =
-      hasObjectives ? sensitivity.objectives.composite : sensitivity.measures.composite;
-  std::vector<std::string> ranked;
+  const bool hasObservations = !sensitivity.ofObservations.empty();
+  const std::vector<double>& composite = hasObservations ? sensitivity.ofObservations
+                                         : hasObjectives ? sensitivity.objectives.composite
+                                                         : sensitivity.measures.composite;
+  std::vector<std::string> labels;
   std::vector<std::vector<double>> rows;
   for (const std::size_t j : sensitivity.ranking) {
-    ranked.push_back(fmt::format("{:>3}. {}", ranked.size() + 1, names.parameters[j]));
+    labels.push_back(fmt::format("{:>3}. {}", labels.size() + 1, names.parameters[j]));
     rows.push_back({composite[j]});
   }
-  const std::string headings[] = {"Composite scaled sensitivity"};
-  appendTable(lines, "Ranking", headings, ranked, rows);
+  const std::string headings[] = {hasObservations ? "Composite scaled sensitivity of the observations"
+                                                  : "Composite scaled sensitivity"};
+  appendTable(lines, "Ranking", headings, labels, rows);
   return lines;
 }
 

@@ -32,9 +32,15 @@ const SettingSection<SensitivitySettings>& localSensitivitySection();
 struct ParameterDifference {
   std::size_t minus = 0;  ///< 0-based among the sets; 0 is the base set
   std::size_t plus = 0;
-  double width = 0.0;   ///< value of the parameter in `plus` minus that in `minus`, search scale; 0: not perturbed
+  double width = 0.0;   ///< value of the parameter in `plus` minus that in `minus`, as written; search scale; 0: none
   double extent = 0.0;  ///< what scales the derivatives: the range or the value, search scale
   std::string problem;  ///< why there are no derivatives; empty when there are some
+  /// The two parts of the width of a central difference, below and above the base value.
+  double widthBelow = 0.0;
+  double widthAbove = 0.0;
+  std::vector<std::string> warnings;  ///< what makes them less certain
+
+  bool isCentral() const { return minus != 0 && plus != 0; }
 };
 
 /// All parameter sets of an analysis, the base set first, and which differences of their results to take.
@@ -46,9 +52,13 @@ struct PerturbationPlan {
 /// Perturbs each parameter of `base` by the fraction of its range on the search scale, or of its value on the model
 /// scale (a logarithmic parameter x becomes x (1 + fraction)); an integer parameter moves by whole steps, at least one.
 /// Where a step would leave the bounds the difference is one-sided, inwards; where neither side has room the step is
-/// shortened.
+/// shortened. The width of a difference is that of the values that a model reads from a field of `fieldWidths`
+/// characters, one entry per parameter of the space (0 or no entry: any value as it is).
 PerturbationPlan planPerturbations(const SensitivitySettings& settings, const SearchSpace& space,
-                                   std::span<const double> base);
+                                   std::span<const double> base, std::span<const int> fieldWidths = {});
+
+/// The entries of the variable parameters, of one per model parameter.
+std::vector<int> ofVariableParameters(std::span<const int> fieldWidths, std::span<const ModelParameter> parameters);
 
 /// Whether parameter j has room for its whole step from the initial value of the space in at least one direction.
 bool hasRoomForStep(const SensitivitySettings& settings, const SearchSpace& space, std::size_t j);
@@ -68,25 +78,43 @@ struct LocalSensitivity {
   std::vector<EvaluationResult> results;
   SensitivityTable measures;
   SensitivityTable objectives;
-  /// 0-based parameters, the most sensitive first, by the composite of the objective functions (of the output measures
-  /// where there is no objective function); ties in setup order, parameters without a composite last.
+  /// The composite scaled sensitivities over the observations, one per parameter; empty unless takeObservations() was
+  /// called.
+  std::vector<double> ofObservations;
+  /// 0-based parameters, the most sensitive first, by the composite of the observations; without that, of the objective
+  /// functions, or of the output measures where there is no objective function.
   std::vector<std::size_t> ranking;
 };
 
-/// Evaluates all perturbed sets in one batch, the base set (the space's initial values) first. A failed run leaves its
-/// parameter's derivatives out, with the reason in the plan.
-LocalSensitivity localSensitivity(const SensitivitySettings& settings, const SearchSpace& space, Evaluator& evaluator);
+/// Indices of the values, the largest first; ties in their order, NaN last.
+std::vector<std::size_t> ranked(std::span<const double> values);
+
+/// Evaluates all perturbed sets in one batch, the base set (the space's initial values) first. Where one of the two
+/// runs of a central difference failed, the other and the base set give a one-sided one; else a failed run leaves its
+/// parameter's derivatives out. The plan says so.
+LocalSensitivity localSensitivity(const SensitivitySettings& settings, const SearchSpace& space, Evaluator& evaluator,
+                                  std::span<const int> fieldWidths = {});
 
 /// The derivatives of any outputs by differences: p columns, one row per value; NaN for a parameter with a problem.
-/// `outputs[i]` are the values of set i; those of a failed set may be empty.
+/// `outputs[i]` are the values of set i; those of a failed set may be empty. A value that one side of a central
+/// difference lacks is replaced by that of the base set.
 std::vector<std::vector<double>> differenceColumns(const PerturbationPlan& plan,
                                                    std::span<const std::vector<double>> outputs);
+
+/// The unit in which each of these values is printed in its file: that of the last digit that any of them has, or of
+/// the last of the most significant digits, whichever is larger.
+std::vector<double> printedUnits(std::span<const double> values, std::span<const std::vector<double>> others);
 
 /// The linearised model for the covariance matrix, from the simulated values of every set at the observation times
 /// (empty for a failed one); nothing when the base set failed.
 std::optional<LinearisedModel> linearise(const PerturbationPlan& plan,
                                          std::span<const std::vector<double>> simulatedValues,
                                          std::span<const double> observedValues, std::vector<double> weights);
+
+/// Computes the composite scaled sensitivities over the observations and ranks by them: the root mean square of the
+/// derivatives of all simulated values times the extent of the parameter and the root of the weight (Hill and
+/// Tiedeman). Unlike the derivatives of a measure of the error, they do not vanish at an optimum.
+void takeObservations(const LinearisedModel& model, LocalSensitivity& sensitivity);
 
 /// The analysis as tables for programs: one row per parameter and output with the derivative, the scaled sensitivity,
 /// the composite of the parameter over all outputs of that kind, and the reason where there is none.

@@ -95,17 +95,20 @@ std::optional<std::int64_t> DateScanner::scanCell(const char*& at, const char* e
   return second;
 }
 
-std::optional<float> parseCell(const char* begin, const char* end) {
+std::optional<double> parseExactCell(const char* begin, const char* end) {
   const std::string_view text = cellText(begin, end);
   // "-nan" is how the C library prints a NaN whose sign bit is set.
   if (text.empty() || text == "NA" || equalIgnoringCase(text, "nan") || equalIgnoringCase(text, "-nan")) {
-    return std::numeric_limits<float>::quiet_NaN();
+    return std::numeric_limits<double>::quiet_NaN();
   }
   const std::optional<double> number = parseReal(text);
-  if (!number) return std::nullopt;
-  const auto value = static_cast<float>(*number);
-  if (!std::isfinite(value)) return std::nullopt;
-  return value;
+  if (!number || std::isinf(static_cast<float>(*number))) return std::nullopt;
+  return number;
+}
+
+std::optional<float> parseCell(const char* begin, const char* end) {
+  const std::optional<double> number = parseExactCell(begin, end);
+  return number ? std::optional(static_cast<float>(*number)) : std::nullopt;
 }
 
 }  // namespace mirevo::csv

@@ -63,5 +63,7 @@ class DateScanner final {
 /// A value cell: a number, or NaN if it is empty, NaN or NA; empty for any other text and for numbers outside the
 /// 32-bit range.
 std::optional<float> parseCell(const char* begin, const char* end);
+/// The same in 64 bits.
+std::optional<double> parseExactCell(const char* begin, const char* end);
 
 }  // namespace mirevo::csv

@@ -171,8 +171,8 @@ void CsvTimeSeries::moveToItem(int item) {
   cellsItem_ = item;
 }
 
-bool CsvTimeSeries::readItem(std::size_t place) {
-  std::vector<float>& values = items_[place].values;
+template <typename Value>
+bool CsvTimeSeries::readCells(std::size_t place, std::vector<Value>& values) {
   moveToItem(static_cast<int>(place) + 1);
   values.reserve(times_.size());
   const char* const begin = content_.data();
@@ -182,7 +182,7 @@ bool CsvTimeSeries::readItem(std::size_t place) {
   };
   for (const std::size_t position : cells_) {
     const char* const cell = begin + position;
-    float value = 0.0F;
+    Value value{};
     const auto [stop, error] = std::from_chars(cell, end, value);
     if (error == std::errc{} && endsCell(stop) && std::isfinite(value)) {
       values.push_back(value);
@@ -190,7 +190,9 @@ bool CsvTimeSeries::readItem(std::size_t place) {
     }
     const char* const lineEnd = csv::trimReturn(cell, csv::endOfLine(cell, end));
     const char* const cellEnd = csv::endOfCell(cell, lineEnd, separator_);
-    const std::optional<float> slow = csv::parseCell(cell, cellEnd);
+    std::optional<Value> slow;
+    if constexpr (std::is_same_v<Value, float>) slow = csv::parseCell(cell, cellEnd);
+    if constexpr (std::is_same_v<Value, double>) slow = csv::parseExactCell(cell, cellEnd);
     if (!slow) {
       values.clear();
       return fail(cell, "a number of at most 3.4028235e38 in size, an empty cell, NaN or NA",
@@ -199,6 +201,16 @@ bool CsvTimeSeries::readItem(std::size_t place) {
     values.push_back(*slow);
   }
   return true;
+}
+
+bool CsvTimeSeries::readItem(std::size_t place) {
+  return readCells(place, items_[place].values);
+}
+
+std::vector<double> CsvTimeSeries::readExactItem(std::size_t place) {
+  std::vector<double> values;
+  readCells(place, values);
+  return values;
 }
 
 bool CsvTimeSeries::fail(const char* at, std::string_view expected, std::string_view found) {

@@ -28,6 +28,9 @@ class CsvTimeSeries final : public StoredTimeSeries {
 
  private:
   bool readItem(std::size_t place) override;
+  std::vector<double> readExactItem(std::size_t place) override;
+  template <typename Value>
+  bool readCells(std::size_t place, std::vector<Value>& values);
   const std::string& sourceName() const override { return sourceName_; }
   void clear();
   bool readPreamble(std::size_t& position);

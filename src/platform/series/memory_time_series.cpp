@@ -29,4 +29,8 @@ bool MemoryTimeSeries::readItem(std::size_t place) {
   return false;
 }
 
+std::vector<double> MemoryTimeSeries::readExactItem(std::size_t place) {
+  return {items_[place].values.begin(), items_[place].values.end()};
+}
+
 }  // namespace mirevo

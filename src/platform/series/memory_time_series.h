@@ -19,6 +19,7 @@ class MemoryTimeSeries final : public StoredTimeSeries {
 
  private:
   bool readItem(std::size_t place) override;
+  std::vector<double> readExactItem(std::size_t place) override;
   const std::string& sourceName() const override { return sourceName_; }
 
   std::string sourceName_ = "series in memory";

@@ -68,16 +68,25 @@ std::string textAttribute(int file, int variable, const char* name) {
   return text;
 }
 
+/// A numeric attribute; its type is NC_NAT and it has no numbers where there is none.
+struct Numbers {
+  nc_type type = NC_NAT;
+  std::vector<double> values;
+};
+
+Numbers numbersAttribute(int file, int variable, const char* name) {
+  Numbers numbers;
+  std::size_t length = 0;
+  if (nc_inq_att(file, variable, name, &numbers.type, &length) != NC_NOERR || !isNumeric(numbers.type)) return {};
+  numbers.values.resize(length);
+  if (nc_get_att_double(file, variable, name, numbers.values.data()) != NC_NOERR) return {};
+  return numbers;
+}
+
 /// The first number of a numeric attribute.
 std::optional<double> numberAttribute(int file, int variable, const char* name) {
-  nc_type type = NC_NAT;
-  std::size_t length = 0;
-  if (nc_inq_att(file, variable, name, &type, &length) != NC_NOERR || length == 0 || !isNumeric(type)) {
-    return std::nullopt;
-  }
-  std::vector<double> numbers(length);
-  if (nc_get_att_double(file, variable, name, numbers.data()) != NC_NOERR) return std::nullopt;
-  return numbers.front();
+  const Numbers numbers = numbersAttribute(file, variable, name);
+  return numbers.values.empty() ? std::nullopt : std::optional(numbers.values.front());
 }
 
 /// The library's fill value for values that were not written, as by a model that stopped half-way. Bytes have none.
@@ -104,28 +113,92 @@ std::optional<double> defaultFill(nc_type type) {
   }
 }
 
+bool isFloating(nc_type type) {
+  return type == NC_FLOAT || type == NC_DOUBLE;
+}
+
 /// Converts the stored numbers of a variable to values.
-struct Unpacking {
-  double fill = kNaN;     ///< NaN: none
-  double missing = kNaN;  ///< NaN: none
-  double scale = 1.0;
-  double offset = 0.0;
+class Unpacking final {
+ public:
+  Unpacking(int file, int variable, nc_type type)
+      : type_(type),
+        scale_(numberAttribute(file, variable, "scale_factor")),
+        offset_(numberAttribute(file, variable, "add_offset")) {
+    Numbers fill = numbersAttribute(file, variable, "_FillValue");
+    if (fill.values.empty()) {
+      if (const auto byDefault = defaultFill(type)) fill = {type, {*byDefault}};
+    }
+    addMarkers(fill);
+    addMarkers(numbersAttribute(file, variable, "missing_value"));
+  }
+
+  /// Takes numbers outside `valid_min`, `valid_max` and `valid_range` as missing, too.
+  void applyValidRange(int file, int variable) {
+    const Numbers range = numbersAttribute(file, variable, "valid_range");
+    if (range.values.size() == 2) {
+      addLimit(range.type, range.values[0], true);
+      addLimit(range.type, range.values[1], false);
+    }
+    for (const bool isLower : {true, false}) {
+      const Numbers limit = numbersAttribute(file, variable, isLower ? "valid_min" : "valid_max");
+      if (limit.values.size() == 1) addLimit(limit.type, limit.values[0], isLower);
+    }
+  }
 
   /// NaN for a stored number that marks a gap.
   double operator()(double stored) const {
-    if (stored == fill || stored == missing) return kNaN;
-    return stored * scale + offset;
+    const double value = stored * scale_.value_or(1.0) + offset_.value_or(0.0);
+    for (const Marker& marker : markers_) {
+      const double number = marker.isOfUnpacked ? value : stored;
+      if (marker.isSingle ? static_cast<float>(number) == static_cast<float>(marker.value) : number == marker.value) {
+        return kNaN;
+      }
+    }
+    for (const Limit& limit : limits_) {
+      const Marker& bound = limit.bound;
+      const double number = bound.isOfUnpacked ? value : stored;
+      const double least = limit.isLower ? bound.value : number;
+      const double most = limit.isLower ? number : bound.value;
+      if (bound.isSingle ? static_cast<float>(most) < static_cast<float>(least) : most < least) return kNaN;
+    }
+    return value;
   }
-};
 
-Unpacking unpackingOf(int file, int variable, nc_type type) {
-  Unpacking unpacking;
-  unpacking.fill = numberAttribute(file, variable, "_FillValue").value_or(defaultFill(type).value_or(kNaN));
-  unpacking.missing = numberAttribute(file, variable, "missing_value").value_or(kNaN);
-  unpacking.scale = numberAttribute(file, variable, "scale_factor").value_or(1.0);
-  unpacking.offset = numberAttribute(file, variable, "add_offset").value_or(0.0);
-  return unpacking;
-}
+ private:
+  /// A number that an attribute gives. It is compared in single precision where one of the two numbers has no more:
+  /// 1e20 in 64 bits is the marker of a variable of 32 bits that holds 1e20.
+  struct Marker {
+    double value = 0.0;
+    bool isSingle = false;
+    bool isOfUnpacked = false;  ///< compared with the unpacked value, not with the stored number
+  };
+  struct Limit {
+    Marker bound;
+    bool isLower = false;
+  };
+
+  bool isPacked() const { return scale_.has_value() || offset_.has_value(); }
+  bool isSingle(nc_type type) const { return type == NC_FLOAT || type_ == NC_FLOAT; }
+
+  /// Markers are meant for the stored numbers; some files give one of another type for the unpacked values.
+  void addMarkers(const Numbers& numbers) {
+    for (const double value : numbers.values) {
+      markers_.push_back({value, isSingle(numbers.type), false});
+      if (isPacked() && numbers.type != type_) markers_.push_back({value, true, true});
+    }
+  }
+  /// By the NetCDF conventions a limit is one of the unpacked values if it has their type and not that of the variable.
+  void addLimit(nc_type type, double value, bool isLower) {
+    const bool isOfUnpacked = isPacked() && type != type_ && isFloating(type);
+    limits_.push_back({{value, isOfUnpacked || isSingle(type), isOfUnpacked}, isLower});
+  }
+
+  nc_type type_;
+  std::optional<double> scale_;
+  std::optional<double> offset_;
+  std::vector<Marker> markers_;
+  std::vector<Limit> limits_;
+};
 
 }  // namespace
 
@@ -198,7 +271,7 @@ bool NetcdfTimeSeries::readTimes(int timeVariable) {
   if (!units) return fail(where + ": " + reason);
   std::vector<double> stored(count);
   if (!succeeded(nc_get_var_double(file_, timeVariable, stored.data()), "reading " + where)) return false;
-  const Unpacking unpack = unpackingOf(file_, timeVariable, variable->type);
+  const Unpacking unpack(file_, timeVariable, variable->type);
   const auto earliest = static_cast<double>(secondNumber({0, 1, 1}));
   const auto latest = static_cast<double>(secondNumber({9999, 12, 31}));
   double first = 0.0;
@@ -267,34 +340,43 @@ std::optional<float> NetcdfTimeSeries::deleteValue() const {
   return std::numeric_limits<float>::quiet_NaN();
 }
 
-bool NetcdfTimeSeries::readItem(std::size_t place) {
-  Item& item = items_[place];
+std::optional<std::vector<double>> NetcdfTimeSeries::readValues(std::size_t place) {
   const Place& at = places_[place];
-  const std::string where = "variable \"" + item.name + "\"";
+  const std::string where = "variable \"" + items_[place].name + "\"";
   nc_type type = NC_NAT;
-  if (!succeeded(nc_inq_vartype(file_, at.variable, &type), "reading " + where)) return false;
+  if (!succeeded(nc_inq_vartype(file_, at.variable, &type), "reading " + where)) return std::nullopt;
   std::vector<std::size_t> start(static_cast<std::size_t>(at.dimensionCount), 0);
   std::vector<std::size_t> count(start.size(), 1);
   count[static_cast<std::size_t>(at.timePosition)] = times_.size();
   if (at.stationPosition >= 0) start[static_cast<std::size_t>(at.stationPosition)] = at.station;
-  std::vector<double> stored(times_.size());
-  if (!succeeded(nc_get_vara_double(file_, at.variable, start.data(), count.data(), stored.data()),
+  std::vector<double> values(times_.size());
+  if (!succeeded(nc_get_vara_double(file_, at.variable, start.data(), count.data(), values.data()),
                  "reading " + where)) {
-    return false;
+    return std::nullopt;
   }
-  const Unpacking unpack = unpackingOf(file_, at.variable, type);
-  std::vector<float> values;
-  values.reserve(stored.size());
-  for (std::size_t step = 0; step < stored.size(); ++step) {
-    const double value = unpack(stored[step]);
-    values.push_back(static_cast<float>(value));
-    if (std::isinf(values.back())) {
-      return fail(fmt::format("{}, step {}: expected a number of at most 3.4028235e38 in size, found {}", where,
-                              step + 1, formatReal(value)));
+  Unpacking unpack(file_, at.variable, type);
+  unpack.applyValidRange(file_, at.variable);
+  for (std::size_t step = 0; step < values.size(); ++step) {
+    values[step] = unpack(values[step]);
+    if (std::isinf(static_cast<float>(values[step]))) {
+      fail(fmt::format("{}, step {}: expected a number of at most 3.4028235e38 in size, found {}", where, step + 1,
+                       formatReal(values[step])));
+      return std::nullopt;
     }
   }
-  item.values = std::move(values);
+  return values;
+}
+
+bool NetcdfTimeSeries::readItem(std::size_t place) {
+  const std::optional<std::vector<double>> values = readValues(place);
+  if (!values) return false;
+  items_[place].values.reserve(values->size());
+  for (const double value : *values) items_[place].values.push_back(static_cast<float>(value));
   return true;
+}
+
+std::vector<double> NetcdfTimeSeries::readExactItem(std::size_t place) {
+  return readValues(place).value_or(std::vector<double>(times_.size(), kNaN));
 }
 
 }  // namespace mirevo

@@ -17,12 +17,15 @@ class NetcdfTimeSeries final : public StoredTimeSeries {
   ~NetcdfTimeSeries() override;
 
   bool open(const std::string& fileName) override;
-  /// NaN: every variable may have markers of its own (`_FillValue`, `missing_value`, the library's default fill value),
-  /// all of which are replaced by NaN.
+  /// NaN: every variable may have markers of its own (`_FillValue`, `missing_value`, the library's default fill value)
+  /// and limits (`valid_min`, `valid_max`, `valid_range`); what they mark is replaced by NaN.
   std::optional<float> deleteValue() const override;
 
  private:
   bool readItem(std::size_t place) override;
+  std::vector<double> readExactItem(std::size_t place) override;
+  /// The values of an item, unpacked; nothing, with the last error, when that fails.
+  std::optional<std::vector<double>> readValues(std::size_t place);
   const std::string& sourceName() const override { return fileName_; }
   /// Where the values of an item are in the file.
   struct Place {

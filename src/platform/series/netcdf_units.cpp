@@ -79,7 +79,9 @@ std::optional<TimeUnits> parseTimeUnits(std::string_view units, std::string_view
   const std::string calendarName = toLowerAscii(trim(calendar));
   const bool isMixed = calendarName.empty() || calendarName == "standard" || calendarName == "gregorian";
   if (!isMixed && calendarName != "proleptic_gregorian") {
-    reason = "expected the calendar standard, gregorian or proleptic_gregorian, found \"" + calendarName + "\"";
+    reason = "expected the calendar standard, gregorian or proleptic_gregorian, found \"" + calendarName +
+             "\": its years have other days than those of the evaluation period; convert the series to the standard "
+             "calendar, or write it as CSV, in which every value has its date";
     return std::nullopt;
   }
   reason = "expected time units like \"hours since 1990-01-01 00:00\", found \"" + std::string(units) + "\"";

@@ -1,5 +1,7 @@
 #include "platform/series/stored_time_series.h"
 
+#include <limits>
+
 #include "common/calendar.h"
 
 namespace mirevo {
@@ -25,6 +27,18 @@ bool StoredTimeSeries::getData(int item) {
 std::span<const float> StoredTimeSeries::values(int item) const {
   if (!hasItem(item)) return {};
   return items_[static_cast<std::size_t>(item - 1)].values;
+}
+
+std::span<const double> StoredTimeSeries::exactValues(int item) {
+  if (!getData(item)) return {};
+  const auto place = static_cast<std::size_t>(item - 1);
+  Item& read = items_[place];
+  if (read.exact.size() == times_.size()) return read.exact;
+  read.exact = readExactItem(place);
+  for (std::size_t k = 0; k < read.values.size(); ++k) {
+    if (isMissing(read.values[k], deleteValue())) read.exact[k] = std::numeric_limits<double>::quiet_NaN();
+  }
+  return read.exact;
 }
 
 }  // namespace mirevo

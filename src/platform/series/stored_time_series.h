@@ -20,16 +20,20 @@ class StoredTimeSeries : public TimeSeriesObject {
   int timeStepCount() const final { return static_cast<int>(times_.size()); }
   std::span<const double> times() const final { return times_; }
   std::span<const float> values(int item) const final;
+  std::span<const double> exactValues(int item) final;
 
  protected:
   struct Item {
     std::string name;
     std::vector<float> values = {};  ///< one per time step; empty until getData()
+    std::vector<double> exact = {};  ///< one per time step; empty until exactValues()
   };
 
   /// Reads the values of an item, given by its 0-based index; false, with lastError_ set and no values, when that
   /// fails.
   virtual bool readItem(std::size_t place) = 0;
+  /// The values of an item that readItem() could read, in 64 bits; those that are missing need no mark.
+  virtual std::vector<double> readExactItem(std::size_t place) = 0;
   /// The name of the source, for messages.
   virtual const std::string& sourceName() const = 0;
 

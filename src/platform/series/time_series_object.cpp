@@ -53,6 +53,21 @@ std::size_t firstStepFrom(std::span<const double> times, double days, std::size_
   return static_cast<std::size_t>(std::lower_bound(first + low, first + high, from) - first);
 }
 
+template <typename Value>
+std::optional<Value> interpolate(std::span<const double> times, std::span<const Value> values,
+                                 std::optional<float> deleteValue, double days, std::size_t& hint) {
+  const std::size_t next = firstStepFrom(times, days, hint);
+  hint = next;
+  if (next >= std::min(times.size(), values.size())) return std::nullopt;
+  const Value nextValue = values[next];
+  if (isMissing(nextValue, deleteValue)) return std::nullopt;
+  if (times[next] <= days + kSameTimeDays) return nextValue;
+  if (next == 0 || isMissing(values[next - 1], deleteValue)) return std::nullopt;
+  const double before = values[next - 1];
+  const double fraction = (days - times[next - 1]) / (times[next] - times[next - 1]);
+  return static_cast<Value>(before + fraction * (static_cast<double>(nextValue) - before));
+}
+
 /// The value of the item in the period that no other value precedes according to `precedes`.
 template <typename Precedes>
 std::optional<float> extractValue(const TimeSeriesObject& series, int item, double start, double end,
@@ -87,19 +102,12 @@ std::unique_ptr<TimeSeriesObject> createTimeSeriesObject(const std::string& file
 }
 
 std::optional<float> valueAt(const TimeSeriesObject& series, int item, double days, std::size_t& hint) {
-  const std::span<const double> times = series.times();
-  const std::span<const float> values = series.values(item);
-  const std::optional<float> deleteValue = series.deleteValue();
-  const std::size_t next = firstStepFrom(times, days, hint);
-  hint = next;
-  if (next >= std::min(times.size(), values.size())) return std::nullopt;
-  const float nextValue = values[next];
-  if (isMissing(nextValue, deleteValue)) return std::nullopt;
-  if (times[next] <= days + kSameTimeDays) return nextValue;
-  if (next == 0 || isMissing(values[next - 1], deleteValue)) return std::nullopt;
-  const double before = values[next - 1];
-  const double fraction = (days - times[next - 1]) / (times[next] - times[next - 1]);
-  return static_cast<float>(before + fraction * (static_cast<double>(nextValue) - before));
+  return interpolate(series.times(), series.values(item), series.deleteValue(), days, hint);
+}
+
+std::optional<double> exactValueAt(std::span<const double> times, std::span<const double> values, double days,
+                                   std::size_t& hint) {
+  return interpolate(times, values, std::nullopt, days, hint);
 }
 
 std::optional<float> valueAt(const TimeSeriesObject& series, int item, double days) {

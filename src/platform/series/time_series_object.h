@@ -38,6 +38,8 @@ class TimeSeriesObject {
   virtual std::span<const double> times() const = 0;
   /// All values of an item, after getData(); timeStepCount() entries.
   virtual std::span<const float> values(int item) const = 0;
+  /// The same with all digits of the file, NaN where one is missing. Reads them at the first call.
+  virtual std::span<const double> exactValues(int item) = 0;
 };
 
 /// An object of the class for the ending of the file name; nullptr for an unknown ending. `reason` then names the known
@@ -49,7 +51,8 @@ std::unique_ptr<TimeSeriesObject> createTimeSeriesObject(const std::string& file
 inline constexpr double kSameTimeDays = 0.5e-3 / 86400.0;
 
 /// Whether a value marks a gap: the delete value, or NaN.
-inline bool isMissing(float value, std::optional<float> deleteValue) {
+template <typename Value>
+bool isMissing(Value value, std::optional<float> deleteValue) {
   return value != value || (deleteValue && value == *deleteValue);
 }
 
@@ -59,6 +62,10 @@ inline bool isMissing(float value, std::optional<float> deleteValue) {
 /// it ends: callers that proceed along the axis pass the same variable again and find each value in constant time.
 std::optional<float> valueAt(const TimeSeriesObject& series, int item, double days, std::size_t& hint);
 std::optional<float> valueAt(const TimeSeriesObject& series, int item, double days);
+
+/// The same in 64 bits for a series of `times` and `values`, in which NaN is missing.
+std::optional<double> exactValueAt(std::span<const double> times, std::span<const double> values, double days,
+                                   std::size_t& hint);
 
 /// Largest and smallest value that is not missing with start <= t <= end; empty when there is none.
 std::optional<float> extractMaxValue(const TimeSeriesObject& series, int item, double start, double end);

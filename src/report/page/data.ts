@@ -141,6 +141,7 @@ export interface Sensitivity {
   derivatives: Maybe[][]; // one row per parameter, one column per output
   dimensionless: Maybe[][];
   composite: Maybe[];
+  isOfObservations?: boolean; // the composite, rather than of the objective functions or output measures
   ranking: string[];
   covariance: Covariance | null;
 }

@@ -139,8 +139,10 @@ void SetupSection::takeRow(const KeywordRow& row, void* settings) const {
   for (int instance = 1; instance <= count; ++instance) {
     takeValue(row, convert(row, *node_->keyword(row.name(), instance)), false, settings);
   }
-  if (count > 0 || isList || row.isLeftOutByDefault()) return;
+  if (count > 0) return;
   if (row.isRequired()) refuseMissing(row);
+  refuseMisspelt(row);
+  if (isList || row.isLeftOutByDefault()) return;
   takeValue(row, defaultSetupValue(row), true, settings);
 }
 
@@ -193,6 +195,7 @@ std::size_t SetupSection::readCount(std::string_view itemPrefix) const {
   const KdxKeyword* keyword = node_->keyword(row.name());
   if (keyword == nullptr) {
     if (present > 0) refuseMissing(row);  // else the items would be ignored silently
+    refuseMisspelt(row);
     echo(row, SetupValue(std::int32_t{0}), true);
     return 0;
   }
@@ -244,13 +247,27 @@ std::string SetupSection::location(std::string_view keyword) const {
   return file_->location(found == nullptr ? node_->position() : found->values.front().position);
 }
 
-void SetupSection::refuseMissing(const KeywordRow& row) const {
+std::vector<std::string> SetupSection::unknownKeywords() const {
   std::vector<std::string> unknown;
   for (const KdxKeyword& keyword : node_->keywords()) {
     if (file_->schema().findKeyword(pattern_, keyword.name) == nullptr) unknown.push_back(keyword.name);
   }
+  return unknown;
+}
+
+void SetupSection::refuseMisspelt(const KeywordRow& row) const {
+  for (const std::string& name : unknownKeywords()) {
+    if (editDistance(name, row.name()) > 1) continue;
+    refuseToRead(node_->keyword(name)->position, row.name(),
+                 fmt::format("the keyword is missing, which would mean {}; found {}, did you mean {}?",
+                             row.isLeftOutByDefault() ? "none" : row.facts.defaultValue, quotedForMessage(name),
+                             quotedForMessage(row.name())));
+  }
+}
+
+void SetupSection::refuseMissing(const KeywordRow& row) const {
   refuseToRead(node_->position(), row.name(),
-               fmt::format("the keyword is missing in section {}{}", path_, didYouMean(row.name(), unknown)));
+               fmt::format("the keyword is missing in section {}{}", path_, didYouMean(row.name(), unknownKeywords())));
 }
 
 void SetupSection::refuseToRead(KdxPosition position, std::string_view keyword, std::string_view explanation) const {

@@ -141,6 +141,10 @@ class SetupSection final {
   /// Refuses the value of the row unless it is within its range.
   void checkRange(const KeywordRow& row, const BoundSection& section) const;
   std::string location(std::string_view keyword) const;
+  /// The unknown keywords of the section.
+  std::vector<std::string> unknownKeywords() const;
+  /// Refuses a keyword that is absent, and would have its default, if an unknown one differs from it by one edit.
+  void refuseMisspelt(const KeywordRow& row) const;
   [[noreturn]] void refuseMissing(const KeywordRow& row) const;
   [[noreturn]] void refuseToRead(KdxPosition position, std::string_view keyword, std::string_view explanation) const;
   void echo(const KeywordRow& row, const SetupValue& value, bool isDefault) const;

@@ -1,11 +1,15 @@
 #include "run/progress/run_log.h"
 
+#include <algorithm>
 #include <cerrno>
 #include <cstring>
 #include <fcntl.h>
 #include <unistd.h>
 #include <utility>
 
+#include <fmt/core.h>
+
+#include "common/descriptor.h"
 #include "common/descriptor_output.h"
 #include "common/file_copy.h"
 
@@ -43,7 +47,22 @@ void RunLog::line(std::string_view text) {
 }
 
 void RunLog::warning(std::string_view text) {
-  line("Warning: " + std::string(text));
+  const std::string record = "Warning: " + std::string(text);
+  line(record);
+  if (++warningCount_ <= static_cast<int>(kMostWarningsKept)) warnings_.emplace_back(text);
+  if (listener_) listener_(record);
+}
+
+bool RunLog::isOfRefusedSetup(const std::string& path) {
+  constexpr off_t kMostRead = 65536;  // the mark is a few lines from the end
+  const Descriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
+  const off_t size = file.get() < 0 ? 0 : ::lseek(file.get(), 0, SEEK_END);
+  if (size <= 0) return false;
+  std::string end(static_cast<std::size_t>(std::min(size, kMostRead)), '\0');
+  const ssize_t length = ::pread(file.get(), end.data(), end.size(), size - static_cast<off_t>(end.size()));
+  if (length <= 0) return false;
+  end.resize(static_cast<std::size_t>(length));
+  return end.find(fmt::format("\n{}\n\n", kRefused)) != std::string::npos;
 }
 
 /// One write(2) per record, so that a signal handler never writes into the middle of one, and without buffering, so

@@ -1,7 +1,10 @@
 #pragma once
 
+#include <functional>
 #include <string>
 #include <string_view>
+#include <utility>
+#include <vector>
 
 namespace mirevo {
 
@@ -9,6 +12,8 @@ namespace mirevo {
 /// kill of the program.
 class RunLog final {
  public:
+  static constexpr std::size_t kMostWarningsKept = 20;
+
   RunLog() = default;
   ~RunLog();
   RunLog(const RunLog&) = delete;
@@ -21,7 +26,19 @@ class RunLog final {
 
   /// Writes one record; several lines if `text` has line ends.
   void line(std::string_view text);
+  /// Writes a record that begins with "Warning: ", and passes it on to whoever listens.
   void warning(std::string_view text);
+  /// From now on `listener` gets every warning as it is in the log.
+  void passWarningsTo(std::function<void(std::string_view)> listener) { listener_ = std::move(listener); }
+
+  /// The first warnings, without "Warning: ", at most kMostWarningsKept of them.
+  const std::vector<std::string>& warnings() const { return warnings_; }
+  int warningCount() const { return warningCount_; }
+
+  /// Writes that no model was run, for isOfRefusedSetup().
+  void markRefused() { line(kRefused); }
+  /// Whether the file is the log of a run whose setup was refused; no, if it cannot be read.
+  static bool isOfRefusedSetup(const std::string& path);
 
   /// For signal handlers; -1 while no file is open.
   int descriptor() const { return descriptor_; }
@@ -31,11 +48,17 @@ class RunLog final {
   const std::string& writeError() const { return writeError_; }
 
  private:
+  static constexpr std::string_view kRefused =
+      "The setup is refused: no model was run, and the next start replaces this log";
+
   void write(std::string_view record);
 
   int descriptor_ = -1;
   std::string path_;
   std::string pending_;  ///< lines written before the file was open
+  std::function<void(std::string_view)> listener_;
+  std::vector<std::string> warnings_;
+  int warningCount_ = 0;
   std::string writeError_;
 };
 

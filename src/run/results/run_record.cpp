@@ -27,6 +27,8 @@ constexpr std::string_view kStarted = "started";
 constexpr std::string_view kRestarted = "restarted";  ///< a row each time
 constexpr std::string_view kPlanned = "plannedEvaluations";
 constexpr std::string_view kSeed = "seed";
+constexpr std::string_view kWarnings = "warnings";
+constexpr std::string_view kWarning = "warning";  ///< a row each
 constexpr std::string_view kInitial = "initialEvaluation";
 constexpr std::string_view kBest = "bestEvaluation";
 constexpr std::string_view kBestAggregate = "bestAggregate";
@@ -86,6 +88,8 @@ void takeRow(const std::string& name, const std::string& value, RunRecord& recor
   if (name == key::kRestarted) record.restarted.push_back(value);
   if (name == key::kPlanned) record.plannedEvaluations = number().value_or(0);
   if (name == key::kSeed) record.seed = number();
+  if (name == key::kWarnings) record.warningCount = number().value_or(0);
+  if (name == key::kWarning) record.warnings.push_back(value);
   if (name == key::kInitial) record.initialEvaluation = number();
   if (name == key::kBest) best().number = number().value_or(0);
   if (name == key::kBestAggregate) best().aggregate = real();
@@ -114,6 +118,8 @@ std::string runRecordText(const RunRecord& record, const std::vector<std::string
   for (const std::string& time : record.restarted) rows.addText(key::kRestarted, time);
   if (record.plannedEvaluations > 0) rows.addCount(key::kPlanned, record.plannedEvaluations);
   if (record.seed) rows.addCount(key::kSeed, *record.seed);
+  if (record.warningCount > 0) rows.addCount(key::kWarnings, record.warningCount);
+  for (const std::string& text : record.warnings) rows.addText(key::kWarning, text);
   if (record.stage) {
     if (record.initialEvaluation) rows.addCount(key::kInitial, *record.initialEvaluation);
     if (record.best) {

@@ -28,6 +28,9 @@ struct RunRecord {
   int plannedEvaluations = 0;          ///< 0: unknown
   std::optional<int> seed;             ///< where the task draws random numbers
 
+  int warningCount = 0;
+  std::vector<std::string> warnings;  ///< the first of them
+
   std::optional<int> initialEvaluation;
   std::optional<ShownEvaluation> best;
   std::optional<int> evaluations;

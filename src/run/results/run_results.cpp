@@ -35,8 +35,10 @@ std::vector<std::string> tableHeadLines(const RunConfig& config) {
 }
 
 /// What is known of a run when it begins.
-RunRecord recordOf(const RunConfig& config) {
+RunRecord recordOf(const RunConfig& config, const RunLog& log) {
   RunRecord record;
+  record.warningCount = log.warningCount();
+  record.warnings = log.warnings();
   if (config.task) record.task = config.task->facts().name.name;
   record.program = programVersion();
   record.plannedEvaluations = config.plannedModelRuns();
@@ -130,7 +132,7 @@ void RunResults::startAfresh(const RunConfig& config, RunLog& log) {
   // Before there is a result, so that none is ever without the settings that it depends on.
   writeRestartSettings(files_.settings, config);
   if (simulatedValues_) simulatedValues_->create();
-  RunRecord record = recordOf(config);
+  RunRecord record = recordOf(config, log);
   record.started = dateAndTimeNow();
   record_.begin(record);
   table_.open(files_.results, headLines(config, record), columns_);
@@ -163,7 +165,7 @@ void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggreg
   if (simulatedValues_) values = simulatedValues_->takeUp(succeeded);
   auto records = earlierRecords(run, failures, std::move(values));
 
-  RunRecord record = recordOf(config);
+  RunRecord record = recordOf(config, log);
   record.started = run.started;
   record.restarted = run.restarted;
   record.restarted.push_back(dateAndTimeNow());

@@ -44,6 +44,9 @@ class SetupReader final {
     if (config_.task) {
       config_.task->read({target_, config_.parameters, parameterSections_, config_.variableParameterCount(),
                           [this](bool hasInitialSample) { requireScales(hasInitialSample); }});
+      for (std::size_t i = 0; i < config_.parameters.size(); ++i) {
+        config_.parameters[i].givenValues = config_.task->givenValues(i);
+      }
     }
     readSimultaneousSimulations();
     readMeasureFile();

@@ -87,6 +87,12 @@ void ScenarioTask::read(const TaskReading& reading) {
                  });
 }
 
+std::vector<double> ScenarioTask::givenValues(std::size_t parameter) const {
+  std::vector<double> values;
+  for (const ScenarioRun& run : settings.runs) values.push_back(run.values[parameter]);
+  return values;
+}
+
 std::string ScenarioTask::description() const {
   return settings.type == ScenarioType::singleRun ? "Scenario runs: Single run using initial parameter set"
                                                   : "Scenario runs: Multiple runs";

@@ -22,6 +22,7 @@ class ScenarioTask final : public Task {
   const TaskFacts& facts() const override;
   std::vector<const SectionRow*> sections() const override;
   void read(const TaskReading& reading) override;
+  std::vector<double> givenValues(std::size_t parameter) const override;
   std::string description() const override;
   int plannedEvaluations(std::size_t variableCount) const override;
   TaskOutcome run(const TaskContext& context) override;
@@ -30,9 +31,8 @@ class ScenarioTask final : public Task {
 };
 
 /// The parameter sets of the runs: the values of the variable parameters, transformed to the search scale. Mapping them
-/// back yields the given values to within the rounding of exp(ln(x)) for a logarithmic parameter, exactly for an
-/// untransformed one, and the grid value for an integer one. Throws FatalError naming run and parameter if a value
-/// cannot be transformed.
+/// back yields the given values, which for an integer parameter are those of its grid, provided that the search space
+/// knows those of logarithmic parameters. Throws FatalError naming run and parameter if a value cannot be transformed.
 std::vector<ParameterSet> scenarioSets(std::span<const ScenarioRun> runs, std::span<const ModelParameter> parameters);
 
 }  // namespace mirevo

@@ -57,6 +57,8 @@ struct ComparedValues {
   std::vector<double> observed;  ///< NaN for an observation that does not count
   std::vector<ObservationLabel> labels;
   std::vector<double> weights;
+  std::vector<std::size_t> series;
+  std::vector<double> units;                   ///< in which the simulated values are printed
   std::vector<std::vector<double>> simulated;  ///< empty for a set that failed
 };
 
@@ -79,11 +81,17 @@ ComparedValues compareSeries(const TaskContext& context, std::span<const Evaluat
                                         [&](std::size_t other) { return isSamePair(measure, measures[other]); });
     if (!counts || isRepeated) continue;
     taken.push_back(series.measure);
+    std::vector<std::vector<double>> runs;
     for (std::size_t i = 0; i < results.size(); ++i) {
       if (!results[i].ok()) continue;
       const auto from = results[i].simulatedValues.begin() + static_cast<std::ptrdiff_t>(begin);
-      compared.simulated[i].insert(compared.simulated[i].end(), from,
-                                   from + static_cast<std::ptrdiff_t>(series.values.size()));
+      runs.emplace_back(from, from + static_cast<std::ptrdiff_t>(series.values.size()));
+      compared.simulated[i].insert(compared.simulated[i].end(), runs.back().begin(), runs.back().end());
+    }
+    compared.series.insert(compared.series.end(), series.values.size(), series.measure);
+    if (!runs.empty()) {
+      const std::vector<double> units = printedUnits(runs.front(), runs);
+      compared.units.insert(compared.units.end(), units.begin(), units.end());
     }
     const std::int64_t origin = secondNumber(series.start);
     for (std::size_t t = 0; t < series.values.size(); ++t) {
@@ -97,29 +105,43 @@ ComparedValues compareSeries(const TaskContext& context, std::span<const Evaluat
   return compared;
 }
 
+/// The model linearised at the base set, with the labels of its rows; or why there is none.
+struct Linearised {
+  std::optional<LinearisedModel> model;
+  std::vector<ObservationLabel> labels;
+  std::string problem;
+};
+
+Linearised linearised(const TaskContext& context, const LocalSensitivity& sensitivity) {
+  Linearised result;
+  if (sensitivity.results.front().ok()) {
+    ComparedValues compared = compareSeries(context, sensitivity.results);
+    if (compared.observed.empty()) {
+      result.problem = "no objective function compares time series";
+      return result;
+    }
+    result.model = linearise(sensitivity.plan, compared.simulated, compared.observed, std::move(compared.weights));
+    if (result.model) {
+      result.model->series = std::move(compared.series);
+      result.model->units = std::move(compared.units);
+    }
+    result.labels = std::move(compared.labels);
+  }
+  if (!result.model) result.problem = "the model run with the initial values failed";
+  return result;
+}
+
 /// Adds the covariance analysis to the outcome.
-void addCovariance(const TaskContext& context, const LocalSensitivity& sensitivity, TaskOutcome& outcome) {
+void addCovariance(const TaskContext& context, const ParameterSet& set, const Linearised& found, TaskOutcome& outcome) {
   outcome.report.emplace_back();
-  if (!sensitivity.results.front().ok()) {
-    outcome.report.emplace_back("Warning: No covariance matrix: the model run with the initial values failed");
+  if (!found.model) {
+    outcome.report.push_back("Warning: No covariance matrix: " + found.problem);
     return;
   }
-  ComparedValues compared = compareSeries(context, sensitivity.results);
-  if (compared.observed.empty()) {
-    outcome.report.emplace_back("Warning: No covariance matrix: no objective function compares time series");
-    return;
-  }
-  const std::optional<LinearisedModel> model =
-      linearise(sensitivity.plan, compared.simulated, compared.observed, std::move(compared.weights));
-  if (!model) {
-    outcome.report.emplace_back("Warning: No covariance matrix: the model run with the initial values failed");
-    return;
-  }
-  const ParameterCovariance covariance = parameterCovariance(*model);
-  const ParameterSet& set = sensitivity.plan.sets.front();
+  const ParameterCovariance covariance = parameterCovariance(*found.model);
   for (std::string& line : formatCovariance(covariance, context.space, set)) outcome.report.push_back(std::move(line));
   for (DataTable& table : covarianceTables(covariance, context.space, set)) outcome.tables.push_back(std::move(table));
-  outcome.tables.push_back(jacobianTable(*model, context.space, compared.labels));
+  outcome.tables.push_back(jacobianTable(*found.model, context.space, found.labels));
 }
 
 }  // namespace
@@ -151,17 +173,22 @@ int SensitivityTask::plannedEvaluations(std::size_t variableCount) const {
   return 1 + perParameter * static_cast<int>(variableCount);
 }
 
-TaskOutcome SensitivityTask::outcomeOf(const TaskContext& context, const LocalSensitivity& sensitivity) const {
+TaskOutcome SensitivityTask::outcomeOf(const TaskContext& context, Evaluator& evaluator) const {
   TaskOutcome outcome{std::string(kEndOfTask)};
+  const std::vector<int> fieldWidths = ofVariableParameters(context.fieldWidths, context.parameters);
+  LocalSensitivity sensitivity = localSensitivity(settings, context.space, evaluator, fieldWidths);
+  Linearised found;
+  if (settings.calculatesCovariance) found = linearised(context, sensitivity);
+  if (found.model) takeObservations(*found.model, sensitivity);
   const AnalysisNames names = analysisNames(context);
   outcome.report = formatSensitivity(sensitivity, names);
   outcome.tables = sensitivityTables(sensitivity, names);
-  if (settings.calculatesCovariance) addCovariance(context, sensitivity, outcome);
+  if (settings.calculatesCovariance) addCovariance(context, sensitivity.plan.sets.front(), found, outcome);
   return outcome;
 }
 
 TaskOutcome SensitivityTask::run(const TaskContext& context) {
-  TaskOutcome outcome = outcomeOf(context, localSensitivity(settings, context.space, context.evaluator));
+  TaskOutcome outcome = outcomeOf(context, context.evaluator);
   logReport(context, outcome.report);
   return outcome;
 }
@@ -170,14 +197,13 @@ std::optional<TaskOutcome> SensitivityTask::unfinishedOutcome(const TaskContext&
                                                               const UnfinishedBatch& made) const {
   std::map<int, EvaluationResult> results;
   for (const EvaluationResult& result : made.results) results[result.number] = result;
+  if (const auto base = results.find(1); base == results.end() || !base->second.ok()) return std::nullopt;
   EvaluationResult missing;
   missing.measureValues.assign(context.measures.size(), kFailedRunValue);
   missing.objectiveValues.assign(context.objectives.size(), kFailedRunValue);
   missing.failure = {EvaluationFailure::Kind::notKnown, "the run ended before", {}};
   StoredResults evaluator(std::move(results), std::move(missing));
-  const LocalSensitivity sensitivity = localSensitivity(settings, context.space, evaluator);
-  if (!sensitivity.results.front().ok()) return std::nullopt;  // every difference is to it, or compared with it
-  return outcomeOf(context, sensitivity);
+  return outcomeOf(context, evaluator);
 }
 
 }  // namespace mirevo

@@ -16,6 +16,7 @@ class SensitivityTask final : public Task {
   std::string description() const override;
   int plannedEvaluations(std::size_t variableCount) const override;
   bool keepsSimulatedValues() const override { return settings.calculatesCovariance; }
+  SeriesPrecision keptPrecision() const override { return SeriesPrecision::exact; }
   TaskOutcome run(const TaskContext& context) override;
   std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const override;
   TaskReport report() const override { return {.sensitivity = &settings}; }
@@ -24,7 +25,8 @@ class SensitivityTask final : public Task {
   SensitivitySettings settings;
 
  private:
-  TaskOutcome outcomeOf(const TaskContext& context, const LocalSensitivity& sensitivity) const;
+  /// The analysis by the evaluations that `evaluator` makes, without the log.
+  TaskOutcome outcomeOf(const TaskContext& context, Evaluator& evaluator) const;
 };
 
 }  // namespace mirevo

@@ -6,6 +6,10 @@ std::vector<std::string> Task::summaryLines(const SearchSpace& /*space*/) const 
   return {};
 }
 
+std::vector<double> Task::givenValues(std::size_t /*parameter*/) const {
+  return {};
+}
+
 std::optional<RaisedBudget> Task::raisedBudget(const SearchHistory& /*history*/) const {
   return std::nullopt;
 }

@@ -56,6 +56,8 @@ struct TaskContext {
   std::string filePrefix = {};  ///< folder and name of the setup: the beginning of the paths of the run's files
   /// The observations whose simulated values the results hold; needed if the task keepsSimulatedValues().
   std::span<const ObservedSeries> observedSeries = {};
+  /// By model parameter, the width of the widest placeholder into which it is written; 0: none.
+  std::vector<int> fieldWidths = {};
 };
 
 /// A file beside the results.
@@ -101,6 +103,8 @@ class Task {
   virtual std::vector<const SectionRow*> sections() const = 0;
   /// Reads and checks its sections. Throws FatalError.
   virtual void read(const TaskReading& reading) = 0;
+  /// The values that its sections give for a parameter, by its 0-based position; runs get them exactly.
+  virtual std::vector<double> givenValues(std::size_t parameter) const;
   /// Whether it may have an initial sample; if so, read() calls requireScales().
   virtual bool mayHaveInitialSample() const { return false; }
 
@@ -119,6 +123,7 @@ class Task {
   virtual bool drawsRandomNumbers() const { return false; }
   /// Whether it uses the simulated values at the observation times, which the results then must hold.
   virtual bool keepsSimulatedValues() const { return false; }
+  virtual SeriesPrecision keptPrecision() const { return SeriesPrecision::single; }
   /// Empty if its batches fill several slots.
   virtual std::optional<OneSlotOnly> needsOneSlot() const { return std::nullopt; }
 

@@ -53,9 +53,10 @@ TEST(ParameterCovariance, SurvivesExtremeUnitsOfAParameter) {
 
 TEST(ParameterCovariance, LeavesOutWhatHasNoVarianceByName) {
   // Columns: constant, zero, unknown, line, constant + 2 line.
-  const LinearisedModel model{{0.1, -0.2, 0.3, -0.3, 0.1},
-                              {},
-                              {{1, 1, 1, 1, 1}, {0, 0, 0, 0, 0}, {1, NAN, 2, 3, 4}, {0, 1, 2, 3, 4}, {1, 3, 5, 7, 9}}};
+  const LinearisedModel model{
+      {0.1, -0.2, 0.3, -0.3, 0.1},
+      {},
+      {{1, 1, 1, 1, 1}, {0, 0, 0, 0, 0}, {NAN, NAN, NAN, NAN, NAN}, {0, 1, 2, 3, 4}, {1, 3, 5, 7, 9}}};
   const ParameterCovariance result = parameterCovariance(model);
   EXPECT_THAT(result.kept, ElementsAre(0, 3));
   EXPECT_NEAR(result.covariance[1][1], 0.1 * 0.08, 1e-15);
@@ -67,6 +68,42 @@ TEST(ParameterCovariance, LeavesOutWhatHasNoVarianceByName) {
                    "Warning: Parameter b3 is left out of the covariance matrix: its derivatives are not known",
                    "Warning: Parameter b5 is left out of the covariance matrix: its effect cannot be told from that of "
                    "the parameters before it"}));
+}
+
+TEST(ParameterCovariance, LeavesOutTheRowThatAnyColumnLacks) {
+  const LinearisedModel line{{0.1, -0.2, 0.3, -0.3, 0.1}, {}, {{1, 1, 1, 1, 1}, {0, 1, 2, 3, 4}}};
+  LinearisedModel longer{{0.1, -0.2, 9, 0.3, -0.3, 0.1}, {}, {{1, 1, NAN, 1, 1, 1}, {0, 1, 7, 2, 3, 4}}};
+  longer.jacobian.emplace_back(6, NAN);  // a failed run's
+  const ParameterCovariance result = parameterCovariance(longer);
+  EXPECT_EQ(result.covariance, parameterCovariance(line).covariance);
+  EXPECT_THAT(result.kept, ElementsAre(0, 1));
+  EXPECT_THAT(formatCovariance(result, spaceOf({1, 2, 3}), std::vector<double>{1, 2, 3}),
+              Contains("Warning: 1 observations are left out of the covariance matrix: a perturbed run has no value "
+                       "there"));
+}
+
+TEST(ParameterCovariance, TellsRoundingFromAnEffect) {
+  // The second column is the first but for what values of three digits leave of it.
+  LinearisedModel model{{0.1, -0.2, 0.3, -0.3, 0.1}, {}, {{1, 2, 3, 4, 5}, {1.003, 1.998, 3.004, 4, 4.997}}};
+  EXPECT_THAT(parameterCovariance(model).kept, ElementsAre(0, 1));
+  model.units.assign(5, 0.001);
+  model.widths = {0.1, 0.1};
+  EXPECT_THAT(parameterCovariance(model).kept, ElementsAre(0));
+  model.widths = {10, 10};
+  EXPECT_THAT(parameterCovariance(model).kept, ElementsAre(0, 1));
+  const std::vector<std::vector<double>> others{{1.25, 7, 0}};
+  EXPECT_EQ(printedUnits(std::vector<double>{120, 0, NAN}, others), (std::vector<double>{1, 0.01, 0}));
+}
+
+TEST(ParameterCovariance, SaysWhatTheCorrelationOfTheResidualsDoesToIt) {
+  LinearisedModel model{{1, 1, -1, -1, 1, 1}, {}, {{1, 1, 1, 1, 1, 1}}};
+  EXPECT_NEAR(parameterCovariance(model).lagOne, 1.0 / 6.0, 1e-15);
+  model.series = {0, 0, 1, 1, 2, 2};
+  const ParameterCovariance result = parameterCovariance(model);
+  EXPECT_NEAR(result.lagOne, 0.5, 1e-15);
+  EXPECT_THAT(formatCovariance(result, spaceOf({1}), std::vector<double>{1}),
+              Contains("Lag-1 correlation of the residuals: 0.500, which makes the standard deviations about 1.7 times "
+                       "too small, and the limits as much too narrow"));
 }
 
 TEST(ParameterCovariance, SaysWhenThereIsNothingToEstimateItFrom) {

@@ -9,6 +9,7 @@
 
 #include "algorithms/function_evaluator.h"
 #include "matchers.h"
+#include "parameters/value_format.h"
 
 namespace mirevo {
 namespace {
@@ -58,9 +59,11 @@ TEST(PlanPerturbations, TakesItsStepsInsideTheBounds) {
       {"integer, at least one", {kInteger, 5, 0, 11}, {kCentral, kOfRange, 0.01}, 4, 6},
       {"integer, rounded", {kInteger, 5, 0, 11}, {kCentral, kOfRange, 0.26}, 2, 8},
       {"integer at its largest value", {kInteger, 10, 0, 11}, {kForward, kOfRange, 0.01}, 9, 10},
+      {"integer, two steps to the bound", {kInteger, 1.3, 0.3, 4.3}, {kForward, kOfRange, 0.6}, 1.3, 3.3},
       {"integer of one value", {kInteger, 4, 4, 5}, {kForward, kOfRange, 0.01}, 4, 4},
   };
   for (const auto& [what, parameter, settings, minus, plus] : cases) {
+    const auto& [type, initial, lower, upper] = parameter;
     const SearchSpace space = spaceOf({{kNone, 7, 0, 14}, parameter});
     const PerturbationPlan plan = planPerturbations(settings, space, space.initial);
     EXPECT_EQ(plan.sets[0], space.initial);
@@ -68,6 +71,10 @@ TEST(PlanPerturbations, TakesItsStepsInsideTheBounds) {
     EXPECT_DOUBLE_EQ(plan.sets[difference.minus][1], minus) << what;
     EXPECT_DOUBLE_EQ(plan.sets[difference.plus][1], plus) << what;
     EXPECT_EQ(difference.problem.empty(), minus < plus) << what;
+    EXPECT_EQ(!difference.warnings.empty(),
+              settings.differencing == kCentral && minus < plus && (minus == initial || plus == initial))
+        << what;
+    EXPECT_TRUE(lower < upper || hasRoomForStep(settings, space, 1)) << what;
     EXPECT_DOUBLE_EQ(difference.width, plus - minus) << what;
     EXPECT_EQ(plan.sets[difference.minus][0], 7.0) << what;
     EXPECT_EQ(plan.sets[difference.plus][0], 7.0) << what;
@@ -78,6 +85,31 @@ TEST(PlanPerturbations, NamesAStepThatRoundsAway) {
   const SearchSpace space = spaceOf({{kNone, 1e18, 1e18 - 1e4, 1e18 + 1e4}});
   const PerturbationPlan plan = planPerturbations({kForward, kOfRange, 1e-6}, space, space.initial);
   EXPECT_EQ(plan.differences[0].problem, "the perturbation is too small to change its value");
+}
+
+/// A model that returns what it reads from fields of nine characters has the derivative 1.
+TEST(LocalSensitivity, DividesByTheStepAsWritten) {
+  constexpr int kWidths[] = {9, 9};
+  FunctionEvaluator evaluator([](const ParameterSet& p) {
+    EvaluationResult result;
+    result.measureValues = {*valueAsWritten(p[0], 9) + std::log(*valueAsWritten(std::exp(p[1]), 9))};
+    return result;
+  });
+  const SearchSpace space = spaceOf({{kNone, 0.30103, 0, 1}, {kLog, std::log(0.0271828), -9, 0}});
+  const AnalysisNames names{space.names, {"y"}, {}};
+  for (const Differencing differencing : {kForward, kCentral}) {
+    for (const double fraction : {0.1, 0.0371, 0.0031}) {
+      const LocalSensitivity found = localSensitivity({differencing, kOfValue, fraction}, space, evaluator, kWidths);
+      EXPECT_NEAR(found.measures.derivatives[0][0], 1.0, 1e-9) << fraction;
+      EXPECT_NEAR(found.measures.derivatives[1][0], 1.0, 1e-9) << fraction;
+    }
+  }
+  // 0.30103 (1 + 0.0031) is 0.301963193, which the field cuts after its fourth digit.
+  EXPECT_THAT(formatSensitivity(localSensitivity({kForward, kOfValue, 0.0031}, space, evaluator, kWidths), names),
+              Contains("Warning: Parameter p1: in its field of 9 characters 0.30103 is written as \"3.010E-01\" and "
+                       "0.301963193 as \"3.019E-01\"; the difference is that of the values as written"));
+  EXPECT_EQ(planPerturbations({kForward, kOfValue, 1e-4}, space, space.initial, kWidths).differences[0].problem,
+            "in its field of 9 characters 0.30103 is written as \"3.010E-01\" and 0.301060103 as \"3.010E-01\"");
 }
 
 /// Measures x² + 3y and e^z; objective functions 2y and z.
@@ -128,6 +160,44 @@ TEST(LocalSensitivity, LeavesAFailedRunsColumnOutByName) {
   EXPECT_THAT(formatSensitivity(result, names), Contains("     3. p2                          NaN"));
 }
 
+// At the optimum the derivative of the error is 0 for the parameter that matters most.
+TEST(LocalSensitivity, RanksByTheObservationsWhereThereAreSome) {
+  FunctionEvaluator evaluator([](const ParameterSet& p) {
+    EvaluationResult result;
+    result.objectiveValues = {1.0 + (p[0] - 2.0) * (p[0] - 2.0) + 0.25 * p[1]};
+    result.aggregate = result.objectiveValues[0];
+    return result;
+  });
+  const SearchSpace space = spaceOf({{kNone, 2, 0, 4}, {kNone, 1, 0, 10}});
+  LocalSensitivity result = localSensitivity({kCentral, kOfRange, 0.1}, space, evaluator);
+  EXPECT_THAT(result.ranking, ElementsAre(1, 0));
+  // Two weighted observations; the third, which is missing, does not count.
+  takeObservations({{0.5, -0.5, NAN}, {1, 4, 1}, {{3, 2, 9}, {0, 0.1, 9}}}, result);
+  EXPECT_THAT(result.ofObservations, ElementsAre(DoubleEq(4 * std::sqrt((9.0 + 16.0) / 2)), DoubleEq(std::sqrt(2.0))));
+  EXPECT_THAT(result.ranking, ElementsAre(0, 1));
+  const AnalysisNames names{space.names, {}, {"error"}};
+  EXPECT_THAT(formatSensitivity(result, names),
+              AllOf(Contains(HasSubstr("Composite scaled sensitivity of the observations")),
+                    Contains(StartsWith("Warning: evaluation 4 fits better than the base set: its aggregate is 1, not "
+                                        "1.25;"))));
+}
+
+TEST(LocalSensitivity, UsesTheOtherSideWhereOneFailed) {
+  FunctionEvaluator evaluator([](const ParameterSet& p) {
+    EvaluationResult result = evaluate(p);
+    if (p[0] > 2.0)
+      result.failure = EvaluationFailure{EvaluationFailure::Kind::timedOut, "the batch ran out of time", {}};
+    return result;
+  });
+  const SearchSpace space = spaceOf({{kNone, 2, 0, 4}, {kNone, 1, 0, 10}, {kLog, 1, 0, 2}});
+  const LocalSensitivity result = localSensitivity({kCentral, kOfRange, 0.1}, space, evaluator);
+  EXPECT_NEAR(result.measures.derivatives[0][0], 3.6, 1e-13);
+  EXPECT_NEAR(result.measures.derivatives[1][0], 3.0, 1e-13);
+  EXPECT_THAT(
+      formatSensitivity(result, {space.names, {"bias", "peak"}, {"low", "high"}}),
+      Contains("Warning: Parameter p1: evaluation 3 failed: the batch ran out of time: the difference is one-sided"));
+}
+
 TEST(LocalSensitivity, OfAFailedBaseSetHasCentralDerivativesOnly) {
   FunctionEvaluator evaluator([](const ParameterSet& p) {
     EvaluationResult result = evaluate(p);
@@ -152,6 +222,10 @@ TEST(Linearise, LeavesTheColumnOfAFailedSetUnknown) {
   EXPECT_THAT(model->residuals, ElementsAre(0.5, -0.5));
   EXPECT_THAT(model->jacobian[0], ElementsAre(0.5, 2.0));
   EXPECT_TRUE(std::isnan(model->jacobian[1][0]) && std::isnan(model->jacobian[1][1]));
+  // A value that one run of a central difference lacks.
+  const PerturbationPlan central = planPerturbations({kCentral, kOfRange, 0.25}, spaceOf({{kNone, 2, 0, 4}}), {{2.0}});
+  EXPECT_THAT(differenceColumns(central, std::vector<std::vector<double>>{{5, 5}, {3, 2}, {6, NAN}})[0],
+              ElementsAre(1.5, 3.0));
 }
 
 }  // namespace

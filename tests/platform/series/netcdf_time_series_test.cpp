@@ -47,8 +47,11 @@ class NetcdfFile final {
   void text(int variable, const char* name, const std::string& value) const {
     check(nc_put_att_text(id_, variable, name, value.size(), value.c_str()));
   }
+  void numbers(int variable, const char* name, nc_type type, const std::vector<double>& values) const {
+    check(nc_put_att_double(id_, variable, name, type, values.size(), values.data()));
+  }
   void number(int variable, const char* name, nc_type type, double value) const {
-    check(nc_put_att_double(id_, variable, name, type, 1, &value));
+    numbers(variable, name, type, {value});
   }
   int time(int dimension, const std::string& units, std::vector<double> values) {
     const int variable = this->variable("time", NC_DOUBLE, {dimension}, std::move(values));
@@ -63,13 +66,16 @@ class NetcdfFile final {
     }
     check(nc_close(id_));
   }
-  /// Daily values of a variable "flow"; writes and closes the file.
-  void writeFlow(const std::vector<double>& flow) {
+  /// Daily values of a variable "flow".
+  int defineFlow(nc_type type, const std::vector<double>& flow) {
     const int days = dimension("time", flow.size());
     std::vector<double> numbers(flow.size());
     std::iota(numbers.begin(), numbers.end(), 0.0);
     time(days, "days since 1990-01-01", numbers);
-    variable("flow", NC_DOUBLE, {days}, flow);
+    return variable("flow", type, {days}, flow);
+  }
+  void writeFlow(const std::vector<double>& flow) {
+    defineFlow(NC_DOUBLE, flow);
     close();
   }
 
@@ -119,6 +125,45 @@ TEST(NetcdfTimeSeries, ReadsVariablesStationsAndPacking) {
   }
 }
 
+TEST(NetcdfTimeSeries, MarkersAndLimitsAreComparedAsTheFileHoldsNumbers) {
+  struct Attribute {
+    const char* name;
+    nc_type type;
+    std::vector<double> numbers;
+  };
+  constexpr float kGap = -999999.0F;
+  // The numbers stored, and the values read.
+  const std::tuple<nc_type, std::vector<Attribute>, std::vector<double>, std::vector<float>> cases[] = {
+      {NC_FLOAT, {{"missing_value", NC_DOUBLE, {1e20, -9999.9}}}, {1e20, 5, -9999.9}, {kGap, 5, kGap}},
+      {NC_DOUBLE, {{"missing_value", NC_FLOAT, {-9999.9}}}, {-9999.9, -9999.8}, {kGap, -9999.8F}},
+      {NC_DOUBLE, {{"missing_value", NC_DOUBLE, {1}}}, {1, 1 + 1e-12}, {kGap, 1}},
+      {NC_INT, {{"missing_value", NC_INT, {7}}, {"scale_factor", NC_DOUBLE, {0.1}}}, {7, 70}, {kGap, 7}},
+      {NC_INT, {{"missing_value", NC_DOUBLE, {-99.9}}, {"scale_factor", NC_DOUBLE, {0.1}}}, {-999, 70}, {kGap, 7}},
+      {NC_FLOAT,
+       {{"valid_min", NC_DOUBLE, {0.1}}, {"valid_max", NC_FLOAT, {0.7}}},
+       {0.1, 0.7, 0.09, 0.71},
+       {0.1F, 0.7F, kGap, kGap}},
+      {NC_SHORT,
+       {{"valid_range", NC_SHORT, {1, 50}}, {"scale_factor", NC_DOUBLE, {2}}},
+       {50, 51, 0},
+       {100, kGap, kGap}},
+      {NC_SHORT,
+       {{"valid_range", NC_DOUBLE, {1, 50}}, {"scale_factor", NC_DOUBLE, {2}}},
+       {25, 26, 0},
+       {50, kGap, kGap}},
+      {NC_SHORT, {{"valid_max", NC_INT, {50}}, {"scale_factor", NC_DOUBLE, {2}}}, {26, 51}, {52, kGap}},
+  };
+  for (const auto& [type, attributes, stored, expected] : cases) {
+    NetcdfFile file("markers.nc");
+    const int flow = file.defineFlow(type, stored);
+    for (const Attribute& each : attributes) file.numbers(flow, each.name, each.type, each.numbers);
+    file.close();
+    NetcdfTimeSeries series;
+    ASSERT_TRUE(series.open(file.path())) << series.lastError();
+    EXPECT_EQ(valuesOf(series, 1), expected) << attributes.front().name << " " << attributes.front().numbers.front();
+  }
+}
+
 TEST(NetcdfTimeSeries, TakesTheTimeVariableThatIsNamedLikeItsDimension) {
   NetcdfFile file("two_times.nc");
   const int time = file.dimension("time", 2);
@@ -140,7 +185,10 @@ TEST(NetcdfTimeSeries, RefusesByName) {
       {days,
        "noleap",
        {0, 1},
-       time + ": expected the calendar standard, gregorian or proleptic_gregorian, found \"noleap\""},
+       time +
+           ": expected the calendar standard, gregorian or proleptic_gregorian, found \"noleap\": its years have "
+           "other days than those of the evaluation period; convert the series to the standard calendar, or write it "
+           "as CSV, in which every value has its date"},
       {"months since 1990-01-01",
        "",
        {0, 1},

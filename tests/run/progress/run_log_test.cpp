@@ -29,6 +29,19 @@ TEST_F(RunLogTest, LinesBeforeOpeningComeFirstAndAnOlderFileIsReplaced) {
   EXPECT_EQ(content(), "before\nWarning: early\ntwo\nlines\n") << "a record is on disk when the call returns";
 }
 
+TEST_F(RunLogTest, WarningsAreCountedKeptAndPassedOn) {
+  RunLog log;
+  std::vector<std::string> heard;
+  log.warning("early");
+  log.passWarningsTo([&heard](std::string_view text) { heard.emplace_back(text); });
+  for (std::size_t i = 1; i <= RunLog::kMostWarningsKept; ++i) log.warning(std::to_string(i));
+  EXPECT_EQ(log.warningCount(), 21);
+  EXPECT_EQ(log.warnings().size(), 20U);
+  EXPECT_EQ(log.warnings().front(), "early");
+  EXPECT_EQ(heard.size(), 20U);
+  EXPECT_EQ(heard.front(), "Warning: 1");
+}
+
 TEST_F(RunLogTest, RecordsOfAnotherWriterAreNotOverwritten) {
   std::string reason;
   RunLog log;

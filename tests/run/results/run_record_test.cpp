@@ -18,6 +18,8 @@ RunRecord begun() {
   record.restarted = {"2001-02-04 04:05:06", "2001-02-05 04:05:06"};
   record.plannedEvaluations = 31;
   record.seed = -4;
+  record.warningCount = 22;
+  record.warnings = {"first\nline", "second"};
   return record;
 }
 
@@ -47,6 +49,8 @@ TEST(RunRecord, ReadsBackAsItWasWritten) {
   EXPECT_EQ(runRecordText(*read, {"Title"}), text);
   EXPECT_EQ(read->best, record.best);
   EXPECT_EQ(read->restarted, record.restarted);
+  EXPECT_EQ(read->warningCount, 22);
+  EXPECT_EQ(read->warnings, record.warnings);
   EXPECT_EQ(read->failuresByKind, record.failuresByKind);
   EXPECT_EQ(read->analysed, 28);
   EXPECT_EQ(read->scales.at(0).objective, "flow # 1");

@@ -45,6 +45,11 @@ TEST_F(SetupReaderTest, RefusesWhatCannotBeReadAndSaysWhere) {
       {"Lower_Bound = 6.5 => Lower_Bond = 6.5", "PARAMETER_3",
        "39:5: Lower_Bound: the keyword is missing in section MODEL_PARAMETERS/PARAMETER_3; found \"Lower_Bond\", did "
        "you mean \"Lower_Bound\"?"},
+      {"Weight_Above = 2.5 => Weigth_Above = 2.5", "MEASURE_1",
+       "68:9: Weight_Above: the keyword is missing, which would mean 1.0; found \"Weigth_Above\", did you mean "
+       "\"Weight_Above\"?"},
+      {"    KeyLine = 'soil' => Keyline = 'soil' & KeyLine = 'depth' => ", "Keywords",
+       "23:5: KeyLine: the keyword is missing, which would mean ''; found \"Keyline\", did you mean \"KeyLine\"?"},
       {"TqSEKdxListItemCount = 3 => ", "MODEL_PARAMETERS",
        "19:3: TqSEKdxListItemCount: the keyword is missing in section MODEL_PARAMETERS"},
       {"TqSEKdxListItemCount = 3 => -3", "MODEL_PARAMETERS",
@@ -130,8 +135,8 @@ TEST_F(SetupReaderTest, EchoesEverySectionAndValueInReadingOrder) {
 TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatEndASearchEarly) {
   // warning: none where it is empty
   const std::pair<const char*, const char*> cases[] = {
-      {"Weight_Above = 2.5 => Weigth_Above = 2.5",
-       "setup.kdx:68:9: keyword \"Weigth_Above\" is unknown and not read, did you mean \"Weight_Above\"?"},
+      {"Weight_Above = 2.5 => Weigth_Abov = 2.5",
+       "setup.kdx:68:9: keyword \"Weigth_Abov\" is unknown and not read, did you mean \"Weight_Above\"?"},
       {"Min_Change = 0.005 => Min_Change = 0.005\nMin_Change = 1.0",
        "setup.kdx:149:1: keyword \"Min_Change\" stands at line 148 already, this one is not read"},
       {"[SCENARIOS] => [Scenario][/Scenario][SCENARIOS]",

@@ -15,12 +15,14 @@ const names = (look: { ink: string }, labels: string[]) => ({
   axisLabel: { color: look.ink, formatter: (name: string) => shorten(name, 24), interval: labels.length > 40 ? 'auto' : 0 },
 });
 
-function rankedPlan({ parameters, ranking, composite }: Sensitivity): ChartPlan {
+function rankedPlan({ parameters, ranking, composite, isOfObservations }: Sensitivity): ChartPlan {
   const valueOf = new Map(parameters.map((name, index) => [name, composite[index] ?? null]));
   const order = ranking.length > 0 ? ranking : parameters;
   return {
     title: 'Composite sensitivity of the parameters',
-    note: 'The longer the bar, the more the outputs change with the parameter. A parameter with hardly any can be fixed.',
+    note: isOfObservations
+      ? 'The longer the bar, the more the simulated values at the times of the observations change with the parameter. A parameter with hardly any can be fixed.'
+      : 'The longer the bar, the more the outputs change with the parameter. At a calibrated set the change of an error is near zero for every parameter: a short bar does not mean that the parameter is negligible.',
     height: rowHeight(order.length),
     switches: [{ key: 'log', label: 'Log' }],
     option: (look, is) => ({
@@ -91,6 +93,7 @@ function covarianceContent(data: ReportData, covariance: Covariance): Node[] {
   });
   return [
     heading('Confidence limits'),
+    paragraph('They assume that the set is the best one, that the model is linear between the limits, and that residuals are independent. Residuals that follow one another make them too narrow; the log states their lag-1 correlation and by how much.'),
     table(columns, rows, 'Confidence limits'),
     ...(covariance.leftOut.length > 0 ? [paragraph(`Left out, as the outputs do not determine them: ${covariance.leftOut.map((name) => `\u2068${shorten(name, 60)}\u2069`).join(', ')}.`)] : []),
     chart(confidencePlan(data, covariance)),
