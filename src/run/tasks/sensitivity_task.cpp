@@ -196,12 +196,15 @@ TaskOutcome SensitivityTask::run(const TaskContext& context) {
 std::optional<TaskOutcome> SensitivityTask::unfinishedOutcome(const TaskContext& context,
                                                               const UnfinishedBatch& made) const {
   std::map<int, EvaluationResult> results;
-  for (const EvaluationResult& result : made.results) results[result.number] = result;
-  if (const auto base = results.find(1); base == results.end() || !base->second.ok()) return std::nullopt;
+  for (const EvaluationResult& result : made.results) {
+    if (result.ok()) results[result.number] = result;
+  }
+  if (!results.contains(1) || results.size() < 2) return std::nullopt;  // a derivative needs the base set and another
+  for (const EvaluationResult& result : made.results) results.try_emplace(result.number, result);
   EvaluationResult missing;
   missing.measureValues.assign(context.measures.size(), kFailedRunValue);
   missing.objectiveValues.assign(context.objectives.size(), kFailedRunValue);
-  missing.failure = {EvaluationFailure::Kind::notKnown, "the run ended before", {}};
+  missing.failure = {EvaluationFailure::Kind::notKnown, "the run ended before it was made", {}};
   StoredResults evaluator(std::move(results), std::move(missing));
   return outcomeOf(context, evaluator);
 }
