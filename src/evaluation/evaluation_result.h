@@ -18,6 +18,7 @@ struct EvaluationFailure {
   enum class Kind {
     constraintsViolated,
     equationNotFinite,
+    valueNotWritable,
     couldNotStart,
     exitCode,
     signal,
@@ -32,7 +33,9 @@ struct EvaluationFailure {
   std::vector<std::string> lastOutput;  ///< the last lines that the batch printed
 
   /// Whether the model was run, or should have been: its folder may then tell more.
-  bool isOfModelRun() const { return kind != Kind::constraintsViolated && kind != Kind::equationNotFinite; }
+  bool isOfModelRun() const {
+    return kind != Kind::constraintsViolated && kind != Kind::equationNotFinite && kind != Kind::valueNotWritable;
+  }
 };
 
 /// The name of a kind of failure for people, "batch ran too long".

@@ -157,16 +157,25 @@ std::string ModelRunner::slotPath(const std::string& baseFile, int slot) const {
   return launcher_.getProcessFolder(slot) + std::string(trimTrailing(baseFile).substr(description_.baseFolder.size()));
 }
 
+std::optional<EvaluationFailure> ModelRunner::findUnwritable(std::span<const double> modelValues) const {
+  for (const ParameterTemplate& parameterTemplate : templates_) {
+    std::string reason = parameterTemplate.unwritableValue(modelValues, parameters_.parameters());
+    if (!reason.empty()) return EvaluationFailure{Kind::valueNotWritable, std::move(reason), {}};
+  }
+  return std::nullopt;
+}
+
 std::optional<EvaluationFailure> ModelRunner::findUnrunnable(std::span<const double> set) {
   const auto mapped = parameters_.MapToModelValues(set);
   if (const auto* failure = std::get_if<ParameterFailure>(&mapped)) return parameterFailure(*failure);
-  return std::nullopt;
+  return findUnwritable(std::get<std::span<const double>>(mapped));
 }
 
 std::optional<EvaluationFailure> ModelRunner::prepareModelRun(std::span<const double> set, int slot) {
   const auto mapped = parameters_.MapToModelValues(set);
   if (const auto* failure = std::get_if<ParameterFailure>(&mapped)) return parameterFailure(*failure);
   const auto modelValues = std::get<std::span<const double>>(mapped);
+  if (auto failure = findUnwritable(modelValues)) return failure;
   const SlotFiles& files = slots_.at(static_cast<std::size_t>(slot - 1));
   // Files of an earlier run must never be taken for results of this one.
   for (const std::string& path : files.simulationFiles) removeFile(path);

@@ -90,6 +90,16 @@ TEST(Report, OfARunThatGoesOnOrWasCutOffSaysSoAndLeavesItsFilesAlone) {
                     HasSubstr(R"("evaluations":1,)")));
 }
 
+TEST(Report, OfASensitivityAnalysisThatGoesOnSaysOfHowManyEvaluationsItsDerivativesAre) {
+  const ModelFolder folder;
+  folder.useScript("test -e second && set -- --sleep-ms 3600000; test -e first && touch second; touch first");
+  RunningProgram run({folder.writeSetup({.option = 1})});
+  ASSERT_TRUE(folder.reaches("basin_Sensitivity.dat", "\n2\tOK\t"));
+  EXPECT_EQ(makeReport(folder).exitCode, 0);
+  EXPECT_THAT(reportData(folder),
+              HasSubstr(R"("notes":["The statistics are those of an unfinished run: of 2 of 5 evaluations."])"));
+}
+
 // Results without the files that this version adds: the report has all that the others hold.
 TEST(Report, OfResultsOfAnEarlierVersion) {
   const ModelFolder folder;

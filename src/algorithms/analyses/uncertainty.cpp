@@ -84,9 +84,11 @@ const SettingSection<NormalDistribution>& distributionSection() {
       {"UNCERTAINTY_ESTIMATION/PARAMETER_n",
        "for each variable parameter",
        "The normal distribution of the n-th *variable* parameter, counted in the order of `MODEL_PARAMETERS`.",
-       {setting<&NormalDistribution::mean>({.name = "Mean_Value",
-                                            .unit = "search scale",
-                                            .meaning = "Mean; that of the logarithm for a logarithmic parameter."}),
+       {setting<&NormalDistribution::mean>(
+            {.name = "Mean_Value",
+             .unit = "search scale",
+             .meaning = "Mean; that of the logarithm for a logarithmic parameter, half a step above "
+                        "the value meant for an integer parameter."}),
         setting<&NormalDistribution::standardDeviation>(
             {.name = "Standard_Deviation",
              .range = kPositive,
@@ -116,14 +118,18 @@ std::vector<ParameterSet> uncertaintySample(const UncertaintySettings& settings,
 }
 
 UncertaintyOutcome uncertaintyAnalysis(const UncertaintySettings& settings, std::int32_t seed, Evaluator& evaluator,
-                                       const MessageSink& messages) {
+                                       const MessageSink& messages,
+                                       const std::function<void(std::span<const ParameterSet>)>& drawn) {
   UncertaintyOutcome outcome;
   if (!settings.parameters.empty()) outcome.sample = uncertaintySample(settings, seed, messages);
+  if (drawn) drawn(outcome.sample);
   outcome.results = evaluator.evaluateParameterSets(outcome.sample, DispatchMode::task);
   return outcome;
 }
 
-UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome) {
+UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome, const SearchSpace& space) {
+  std::vector<std::vector<double>> modelValues;
+  for (const ParameterSet& set : outcome.sample) modelValues.push_back(ToModelScale(space, set));
   std::vector<const EvaluationResult*> successful;
   for (const EvaluationResult& result : outcome.results) {
     if (result.ok()) successful.push_back(&result);
@@ -132,8 +138,8 @@ UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome) {
   summary.evaluationCount = outcome.results.size();
   summary.failedCount = outcome.results.size() - successful.size();
   summary.parameters = summariseColumns(
-      outcome.sample.size(), [&](std::size_t i) -> auto& { return outcome.sample[i]; });
-  summary.correlations = correlationMatrix(outcome.sample);
+      modelValues.size(), [&](std::size_t i) -> auto& { return modelValues[i]; });
+  summary.correlations = correlationMatrix(modelValues);
   summary.measures = summariseColumns(
       successful.size(), [&](std::size_t i) -> auto& { return successful[i]->measureValues; });
   summary.objectives = summariseColumns(
@@ -145,7 +151,7 @@ std::vector<DataTable> uncertaintyTables(const UncertaintySummary& summary, cons
   DataTable table;
   table.file = run_files::kQuantiles;
   table.headLines = {
-      "Parameters on the search scale, of all sets drawn; measures and objective functions of those whose "
+      "Parameters on the model scale, of all sets evaluated; measures and objective functions of those whose "
       "model run succeeded"};
   table.columns = {"Kind", "Name", "Count", "Mean", "StandardDeviation"};
   for (const double p : kSummaryProbabilities) table.columns.push_back(fmt::format("{:g} %", 100.0 * p));
@@ -162,20 +168,21 @@ std::vector<DataTable> uncertaintyTables(const UncertaintySummary& summary, cons
   add("measure", names.measures, summary.measures);
   add("objective", names.objectives, summary.objectives);
   return {std::move(table),
-          matrixTable(run_files::kSampleCorrelation, "Correlation of the parameters of all sets drawn",
+          matrixTable(run_files::kSampleCorrelation, "Correlation of the parameters of all sets evaluated, model scale",
                       names.parameters, summary.correlations)};
 }
 
-std::vector<std::string> formatUncertainty(const UncertaintySummary& summary, const AnalysisNames& names) {
+std::vector<std::string> formatUncertainty(const UncertaintySummary& summary, const AnalysisNames& names,
+                                           std::string_view correlationFile) {
   std::vector<std::string> lines;
   lines.push_back(fmt::format("Uncertainty analysis: {} evaluations, {} failed and left out of the statistics",
                               summary.evaluationCount, summary.failedCount));
-  appendSummaries(lines, "Parameter (search scale)", names.parameters, summary.parameters);
+  appendSummaries(lines, "Parameter (model scale)", names.parameters, summary.parameters);
   appendSummaries(lines, "Output measure", names.measures, summary.measures);
   appendSummaries(lines, "Objective function", names.objectives, summary.objectives);
   lines.emplace_back();
   for (std::string& line :
-       formatTable("Sample correlation", names.parameters, names.parameters, summary.correlations)) {
+       formatCorrelation("Sample correlation", names.parameters, summary.correlations, correlationFile)) {
     lines.push_back(std::move(line));
   }
   return lines;

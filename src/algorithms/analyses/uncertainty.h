@@ -1,7 +1,10 @@
 #pragma once
 
 #include <cstdint>
+#include <functional>
+#include <span>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "algorithms/numbers/sample_summary.h"
@@ -10,6 +13,7 @@
 #include "common/parameter_set.h"
 #include "common/settings/keyword_row.h"
 #include "evaluation/evaluator.h"
+#include "parameters/search_space.h"
 
 namespace mirevo {
 
@@ -50,9 +54,10 @@ struct UncertaintyOutcome {
 
 /// Draws the sample and evaluates it in one batch (an empty one where there is no variable parameter). The scale of the
 /// objective functions is not taken from the sample: no aggregate is used here, and a constant objective function must
-/// not end the analysis.
+/// not end the analysis. `drawn` receives the sample before it is evaluated.
 UncertaintyOutcome uncertaintyAnalysis(const UncertaintySettings& settings, std::int32_t seed, Evaluator& evaluator,
-                                       const MessageSink& messages = {});
+                                       const MessageSink& messages = {},
+                                       const std::function<void(std::span<const ParameterSet>)>& drawn = {});
 
 /// Names of what an analysis reports, for its tables; each list in setup order.
 struct AnalysisNames {
@@ -64,19 +69,20 @@ struct AnalysisNames {
 struct UncertaintySummary {
   std::size_t evaluationCount = 0;
   std::size_t failedCount = 0;                    ///< left out of the statistics of measures and objective functions
-  std::vector<SampleSummary> parameters;          ///< of all sets drawn, search scale
-  std::vector<std::vector<double>> correlations;  ///< of the parameters of all sets drawn
+  std::vector<SampleSummary> parameters;          ///< of all sets evaluated, as the model gets them
+  std::vector<std::vector<double>> correlations;  ///< of the same values
   std::vector<SampleSummary> measures;
   std::vector<SampleSummary> objectives;
 };
 
-UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome);
+UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome, const SearchSpace& space);
 
-/// The summary as tables for programs: mean, standard deviation and quantiles of each parameter (search scale), measure
+/// The summary as tables for programs: mean, standard deviation and quantiles of each parameter (model scale), measure
 /// and objective function; the correlation of the sampled parameters.
 std::vector<DataTable> uncertaintyTables(const UncertaintySummary& summary, const AnalysisNames& names);
 
-/// The summary as lines of text for the log.
-std::vector<std::string> formatUncertainty(const UncertaintySummary& summary, const AnalysisNames& names);
+/// The summary as lines of text for the log. `correlationFile` is the name of the file with the table of correlations.
+std::vector<std::string> formatUncertainty(const UncertaintySummary& summary, const AnalysisNames& names,
+                                           std::string_view correlationFile);
 
 }  // namespace mirevo

@@ -1,6 +1,8 @@
 #include "run/results/run_results.h"
 
+#include <filesystem>
 #include <set>
+#include <system_error>
 #include <utility>
 
 #include <fmt/core.h>
@@ -62,6 +64,7 @@ RunResults::RunResults(const RunConfig& config, const SearchSpace& space, const 
       record_(files_.record, tableHead_) {
   if (config.task && config.restart != RestartMode::startAfresh) {
     auto record = record_.readEarlier();
+    earlierRunHasStatistics_ = record && record->analysed;
     const bool isDamaged = !record && readFileIfThere(files_.record);
     earlierRun_ = findEarlierRun(files_, config, columns_, std::move(record));
     if (earlierRun_ && isDamaged) {
@@ -163,8 +166,19 @@ void RunResults::startAfresh(const RunConfig& config, RunLog& log) {
   table_.open(files_.results, headLines(config, record), columns_);
 }
 
+void RunResults::removeStatistics(const RunConfig& config) const {
+  std::vector<std::string> paths;
+  for (const RunFile& table : names_.tables) paths.push_back(runFilePath(filePrefix_, table));
+  for (int measure = 1; measure <= static_cast<int>(config.measures.size()); ++measure) {
+    paths.push_back(runFilePath(filePrefix_, run_files::kBand, measure));
+  }
+  std::error_code ignored;
+  for (const std::string& path : paths) std::filesystem::remove(path, ignored);
+}
+
 void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggregator, RunLog& log) {
   EarlierRun run = *std::exchange(earlierRun_, std::nullopt);
+  if (earlierRunHasStatistics_) removeStatistics(config);
   std::map<int, std::vector<double>> failedSets;
   std::set<int> failed;
   std::set<int> succeeded;

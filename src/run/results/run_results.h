@@ -61,6 +61,8 @@ class RunResults final {
   void lockFailedRuns(RunLog& log);
   void startAfresh(const RunConfig& config, RunLog& log);
   void keepEarlierFiles(const RunConfig& config, RunLog& log) const;
+  /// Those of an unfinished run do not count any more when it goes on, and can be computed again.
+  void removeStatistics(const RunConfig& config) const;
   void goOn(const RunConfig& config, const ObjectiveAggregator& aggregator, RunLog& log);
 
   SearchSpace space_;
@@ -70,6 +72,7 @@ class RunResults final {
   ResultFileNames names_;
   RestartFiles files_;
   std::optional<EarlierRun> earlierRun_;
+  bool earlierRunHasStatistics_ = false;  ///< of an analysis that did not come to its end
   ResultFile table_;
   FileLock failedRunsLock_;  ///< on `calSimErr.dat`
   FailedRunFile failedRuns_;

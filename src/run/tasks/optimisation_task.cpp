@@ -163,11 +163,11 @@ std::string OptimisationTask::description() const {
                      usesSurrogate() ? " with surrogate model" : "");
 }
 
-std::vector<std::string> OptimisationTask::summaryLines(std::size_t variableCount) const {
+std::vector<std::string> OptimisationTask::summaryLines(const SearchSpace& space) const {
   if (!usesSurrogate()) return {};
   return {fmt::format(
       "Surrogate model: {} fitted to the {} nearest sets, chooses one of {} proposals; loops without it: {}",
-      surrogateModelName(surrogate), neighbourhoodSize(surrogate, variableCount), proposalsPerRun(surrogate),
+      surrogateModelName(surrogate), neighbourhoodSize(surrogate, space.size()), proposalsPerRun(surrogate),
       surrogate.initialGenerations)};
 }
 

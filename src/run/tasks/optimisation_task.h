@@ -19,7 +19,7 @@ class OptimisationTask final : public Task {
   void read(const TaskReading& reading) override;
   bool mayHaveInitialSample() const override { return true; }
   std::string description() const override;
-  std::vector<std::string> summaryLines(std::size_t variableCount) const override;
+  std::vector<std::string> summaryLines(const SearchSpace& space) const override;
   int plannedEvaluations(std::size_t /*variableCount*/) const override { return stopping.maxEvaluations; }
   bool hasFinalRun() const override { return true; }
   bool drawsRandomNumbers() const override { return true; }

@@ -3,12 +3,14 @@
 #include <algorithm>
 #include <cmath>
 #include <limits>
+#include <map>
 #include <utility>
 
 #include <fmt/format.h>
 
 #include "algorithms/analyses/covariance.h"
 #include "common/calendar.h"
+#include "evaluation/stored_results.h"
 #include "measures/period_series.h"
 #include "run/tasks/analysis_names.h"
 
@@ -170,10 +172,10 @@ int SensitivityTask::plannedEvaluations(std::size_t variableCount) const {
   return 1 + perParameter * static_cast<int>(variableCount);
 }
 
-TaskOutcome SensitivityTask::run(const TaskContext& context) {
+TaskOutcome SensitivityTask::outcomeOf(const TaskContext& context, Evaluator& evaluator) const {
   TaskOutcome outcome{std::string(kEndOfTask)};
   const std::vector<int> fieldWidths = ofVariableParameters(context.fieldWidths, context.parameters);
-  LocalSensitivity sensitivity = localSensitivity(settings, context.space, context.evaluator, fieldWidths);
+  LocalSensitivity sensitivity = localSensitivity(settings, context.space, evaluator, fieldWidths);
   Linearised found;
   if (settings.calculatesCovariance) found = linearised(context, sensitivity);
   if (found.model) takeObservations(*found.model, sensitivity);
@@ -181,8 +183,29 @@ TaskOutcome SensitivityTask::run(const TaskContext& context) {
   outcome.report = formatSensitivity(sensitivity, names);
   outcome.tables = sensitivityTables(sensitivity, names);
   if (settings.calculatesCovariance) addCovariance(context, sensitivity.plan.sets.front(), found, outcome);
+  return outcome;
+}
+
+TaskOutcome SensitivityTask::run(const TaskContext& context) {
+  TaskOutcome outcome = outcomeOf(context, context.evaluator);
   logReport(context, outcome.report);
   return outcome;
+}
+
+std::optional<TaskOutcome> SensitivityTask::unfinishedOutcome(const TaskContext& context,
+                                                              const UnfinishedBatch& made) const {
+  std::map<int, EvaluationResult> results;
+  for (const EvaluationResult& result : made.results) {
+    if (result.ok()) results[result.number] = result;
+  }
+  if (!results.contains(1) || results.size() < 2) return std::nullopt;  // a derivative needs the base set and another
+  for (const EvaluationResult& result : made.results) results.try_emplace(result.number, result);
+  EvaluationResult missing;
+  missing.measureValues.assign(context.measures.size(), kFailedRunValue);
+  missing.objectiveValues.assign(context.objectives.size(), kFailedRunValue);
+  missing.failure = {EvaluationFailure::Kind::notKnown, "the run ended before it was made", {}};
+  StoredResults evaluator(std::move(results), std::move(missing));
+  return outcomeOf(context, evaluator);
 }
 
 }  // namespace mirevo

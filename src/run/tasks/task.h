@@ -111,7 +111,9 @@ class Task {
   /// "Parameter optimisation: Dynamically Dimensioned Search"
   virtual std::string description() const = 0;
   /// Further lines for the summary of the setup.
-  virtual std::vector<std::string> summaryLines(std::size_t variableCount) const;
+  virtual std::vector<std::string> summaryLines(const SearchSpace& space) const;
+  /// Warnings for the log about settings that work but may not be meant.
+  virtual std::vector<std::string> warnings(const SearchSpace& /*space*/) const { return {}; }
 
   /// Number of planned evaluations, on which the failed-run limit is based.
   virtual int plannedEvaluations(std::size_t variableCount) const = 0;
@@ -127,6 +129,13 @@ class Task {
 
   /// Runs it. Throws FatalError and RunCancelled.
   virtual TaskOutcome run(const TaskContext& context) = 0;
+
+  /// What can be said of the evaluations `made` when an error or a cancellation has ended run(); nothing is logged.
+  /// Empty if nothing can, and for a task without statistics.
+  virtual std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& /*context*/,
+                                                       const UnfinishedBatch& /*made*/) const {
+    return std::nullopt;
+  }
 
   virtual TaskReport report() const { return {}; }
 

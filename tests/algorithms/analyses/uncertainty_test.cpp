@@ -63,7 +63,8 @@ TEST(UncertaintyAnalysis, EvaluatesOneBatchAndLeavesFailuresOut) {
   const UncertaintyOutcome outcome = uncertaintyAnalysis({SamplingType::simpleRandom, 5, {{1.0, 0.0}}}, 1, evaluator);
   ASSERT_EQ(evaluator.batches.size(), 1U);
   EXPECT_EQ(evaluator.batches[0].size(), 5U);
-  const UncertaintySummary summary = summariseUncertainty(outcome);
+  const SearchSpace space{.names = {"K"}, .lower = {0.0}, .upper = {5.0}, .transformation = {TransformationType::none}};
+  const UncertaintySummary summary = summariseUncertainty(outcome, space);
   EXPECT_EQ(summary.failedCount, 2U);
   EXPECT_EQ(summary.objectives[0].count, 3U);
   EXPECT_EQ(summary.objectives[0].mean, 2.0);
@@ -71,11 +72,11 @@ TEST(UncertaintyAnalysis, EvaluatesOneBatchAndLeavesFailuresOut) {
   EXPECT_DOUBLE_EQ(summary.objectives[0].quantiles[0], 1.1);
   EXPECT_EQ(summary.parameters[0].count, 5U);
   EXPECT_THAT(
-      formatUncertainty(summary, {{"K"}, {"bias", "peak"}, {"low"}}),
+      formatUncertainty(summary, {{"K"}, {"bias", "peak"}, {"low"}}, ""),
       ElementsAre(
           "Uncertainty analysis: 5 evaluations, 2 failed and left out of the statistics", "",
-          HasSubstr("Parameter (search scale)"),
-          "   K                                     1              0              1              1              1"
+          HasSubstr("Parameter (model scale)"),
+          "   K                                    1              0              1              1              1"
           "              1              1",
           "", HasSubstr("Std. deviation"), HasSubstr("bias "), HasSubstr("peak "), "", HasSubstr("95 %"),
           "   low                             2              1            1.1            1.5              2"
