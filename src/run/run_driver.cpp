@@ -350,7 +350,7 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
     if (!detail.empty()) text.append("\n").append(detail);
     if (reporter_ && reporter_->failedCount() > 0)
       text +=
-          fmt::format("\nfailed model runs are described in {}", fileNameOf(results_->failedRuns().paths().forPeople));
+          fmt::format("\nfailed evaluations are described in {}", fileNameOf(results_->failedRuns().paths().forPeople));
     state_.log.line("");
     if (reporter_) logFailures();
     state_.log.line(text);
