@@ -230,7 +230,11 @@ TaskOutcome RunDriver::runTask() {
   TaskOutcome outcome = config_.task->run({parameters_->searchSpace(), config_.parameters, config_.measures,
                                            config_.objectives, *evaluator_, state_.log,
                                            [this](const SearchSummary& summary) { reporter_->takeBestOf(summary); },
-                                           filePrefix_, runner_->observedSeries()});
+                                           filePrefix_, runner_->observedSeries(), parameters_->feasibility(),
+                                           [this](std::string_view text) {
+                                             state_.log.warning(text);
+                                             showMessage(text, {}, MessageType::warning);
+                                           }});
   for (const TaskFile& file : outcome.files) writeBesideResults(file.path, file.content);
   return outcome;
 }

@@ -18,6 +18,7 @@
 #include "measures/objective_functions.h"
 #include "measures/observed_series.h"
 #include "measures/output_measure.h"
+#include "parameters/feasibility.h"
 #include "parameters/search_space.h"
 #include "run/access/setup_access.h"
 #include "run/progress/run_log.h"
@@ -56,6 +57,9 @@ struct TaskContext {
   std::string filePrefix = {};  ///< folder and name of the setup: the beginning of the paths of the run's files
   /// The observations whose simulated values the results hold; needed if the task keepsSimulatedValues().
   std::span<const ObservedSeries> observedSeries = {};
+  Feasibility feasibility = {};  ///< which sets can be run, of a model with constraints
+  /// Shows the user a warning that the log receives as well. May be empty.
+  std::function<void(std::string_view)> warnUser = {};
 };
 
 /// A file beside the results.

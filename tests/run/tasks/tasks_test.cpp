@@ -22,7 +22,13 @@ ModelParameter parameter(const char* name, ParameterType type, TransformationTyp
 class TasksTest : public ::testing::Test {
  protected:
   std::string run(Task& task) {
-    return task.run({space_, parameters_, {}, objectives_, evaluator_, log_}).terminationMessage;
+    TaskContext context{space_, parameters_, {}, objectives_, evaluator_, log_};
+    context.feasibility = feasibility_;
+    context.warnUser = [this](std::string_view text) {
+      EXPECT_THAT(evaluator_.batches, IsEmpty()) << "before the first model run";
+      warnings_.emplace_back(text);
+    };
+    return task.run(context).terminationMessage;
   }
 
   std::vector<ModelParameter> parameters_{parameter("a", ParameterType::variable, TransformationType::none),
@@ -33,6 +39,8 @@ class TasksTest : public ::testing::Test {
   SearchSpace space_ = BuildSearchSpace(parameters_);
   FunctionEvaluator evaluator_{[](const ParameterSet& set) { return resultOf(set.front()); }};
   RunLog log_;
+  Feasibility feasibility_;
+  std::vector<std::string> warnings_;  ///< shown to the user
 };
 
 TEST_F(TasksTest, MultipleRunsAreOneBatchAndComeBackToTheirModelValues) {
@@ -52,6 +60,35 @@ TEST_F(TasksTest, AScenarioValueWithoutALogarithmIsRefusedByRunAndParameter) {
             "Error: Invalid parameter transformation for parameter c\n"
             "Scenario run 2 has the value 0, which has no logarithm.");
   EXPECT_TRUE(evaluator_.batches.empty());
+}
+
+TEST_F(TasksTest, MoreSetsThatCannotBeRunThanMayFailAreToldBeforeTheFirstModelRun) {
+  feasibility_ = Feasibility([](std::span<const double> set) -> std::optional<std::string> {
+    return set[0] < 5.0 ? std::nullopt : std::optional<std::string>("constraint 1 (a < 5)");
+  });
+  ScenarioTask scenarios;
+  scenarios.settings.type = ScenarioType::multipleRuns;
+  for (int i = 0; i < 30; ++i) scenarios.settings.runs.push_back({{i < 27 ? 1.0 : 6.0, 1.0, 1.0, 1.0}});
+  run(scenarios);
+  EXPECT_THAT(warnings_, IsEmpty()) << "three of 30 may fail";
+  for (int i = 0; i < 23; ++i) scenarios.settings.runs[static_cast<std::size_t>(i)].values[0] = 7.0;
+  evaluator_.batches.clear();
+  run(scenarios);
+  EXPECT_THAT(
+      warnings_,
+      ElementsAre("Constraints are violated by 26 of 30 scenarios, which are not run and fail: No. 1, 2, 3, 4, 5, "
+                  "6, 7, 8, 9, 10, 11, 12, 13, 14, 15, 16, 17, 18, 19, 20 and 6 more\n"
+                  "   No. 1: constraint 1 (a < 5)\n"
+                  "   The run will end before it is complete: at most 3 may fail, a tenth of the 30 planned"));
+
+  OptimisationTask optimisation;  // from initial values that violate it
+  space_.initial[0] = 9.0;
+  optimisation.method = searchMethods().make(SetupValue(2));
+  optimisation.stopping = {.maxEvaluations = 9, .minChange = 0.0};
+  evaluator_.batches.clear();
+  run(optimisation);
+  ASSERT_EQ(warnings_.size(), 2U);
+  EXPECT_THAT(warnings_[1], StartsWith("Constraints are violated by 1 of 1 given sets of the initial sample, "));
 }
 
 TEST_F(TasksTest, AnUnknownUseOfASurrogateModelRunsNothingAndEndsNormally) {
