@@ -4,6 +4,7 @@
 
 #include "algorithms/analyses/series_band.h"
 #include "run/tasks/analysis_names.h"
+#include "run/tasks/infeasible_sets.h"
 
 namespace mirevo {
 namespace {
@@ -54,13 +55,33 @@ std::string UncertaintyTask::description() const {
                      kSamplingTypeNames[settings.samplingType == SamplingType::latinHypercube ? 1 : 0].name);
 }
 
+/// `acceptance`: a line on the sets drawn, if any can be drawn again.
+std::vector<ParameterSet> UncertaintyTask::drawSample(const TaskContext& context, std::string& acceptance) const {
+  if (settings.parameters.empty()) return {};
+  const auto messages = [&](std::string_view text) { context.log.line(text); };
+  if (!settings.redrawsInfeasible) {
+    std::vector<ParameterSet> sample = uncertaintySample(settings, randomSeed, messages);
+    warnOfInfeasibleSets(context, sample, "sets of the sample", settings.sampleSize,
+                         "With Redraw_Infeasible = 1 in UNCERTAINTY_ESTIMATION sets are drawn until all can be run");
+    return sample;
+  }
+  FeasibleSample sample = feasibleUncertaintySample(settings, randomSeed, context.feasibility, messages);
+  const auto kept = static_cast<double>(sample.sets.size());
+  acceptance =
+      fmt::format("Redraw_Infeasible: {} sets that can be run out of {} drawn, an acceptance rate of {:.1f} %",
+                  sample.sets.size(), sample.drawnCount, 100.0 * kept / static_cast<double>(sample.drawnCount));
+  context.log.line(acceptance);
+  return std::move(sample.sets);
+}
+
 TaskOutcome UncertaintyTask::run(const TaskContext& context) {
-  const UncertaintyOutcome found = uncertaintyAnalysis(settings, randomSeed, context.evaluator,
-                                                       [&](std::string_view text) { context.log.line(text); });
+  std::string acceptance;
+  const UncertaintyOutcome found = uncertaintyAnalysis(drawSample(context, acceptance), context.evaluator);
   TaskOutcome outcome{std::string(kEndOfTask)};
   const UncertaintySummary summary = summariseUncertainty(found);
   const AnalysisNames names = analysisNames(context);
   outcome.report = formatUncertainty(summary, names);
+  if (!acceptance.empty()) outcome.report.insert(outcome.report.begin() + 1, acceptance);
   outcome.tables = uncertaintyTables(summary, names);
   logReport(context, outcome.report);
   const std::vector<std::string> bands = reportBands(context, found.results, outcome.files);

@@ -11,6 +11,7 @@
 #include "refusal.h"
 #include "run/tasks/optimisation_task.h"
 #include "run/tasks/scenario_task.h"
+#include "run/tasks/uncertainty_task.h"
 
 namespace mirevo {
 namespace {
@@ -22,25 +23,29 @@ ModelParameter parameter(const char* name, ParameterType type, TransformationTyp
 class TasksTest : public ::testing::Test {
  protected:
   std::string run(Task& task) {
-    TaskContext context{space_, parameters_, {}, objectives_, evaluator_, log_};
+    TaskContext context{space_, parameters_, measures_, objectives_, evaluator_, log_};
     context.feasibility = feasibility_;
     context.warnUser = [this](std::string_view text) {
       EXPECT_THAT(evaluator_.batches, IsEmpty()) << "before the first model run";
       warnings_.emplace_back(text);
     };
-    return task.run(context).terminationMessage;
+    const TaskOutcome outcome = task.run(context);
+    report_ = outcome.report;
+    return outcome.terminationMessage;
   }
 
   std::vector<ModelParameter> parameters_{parameter("a", ParameterType::variable, TransformationType::none),
                                           parameter("b", ParameterType::fixed, TransformationType::none),
                                           parameter("c", ParameterType::variable, TransformationType::logarithmic),
                                           parameter("d", ParameterType::variable, TransformationType::integer)};
+  std::vector<OutputMeasure> measures_{1};
   std::vector<ObjectiveFunction> objectives_{1};
   SearchSpace space_ = BuildSearchSpace(parameters_);
   FunctionEvaluator evaluator_{[](const ParameterSet& set) { return resultOf(set.front()); }};
   RunLog log_;
   Feasibility feasibility_;
   std::vector<std::string> warnings_;  ///< shown to the user
+  std::vector<std::string> report_;
 };
 
 TEST_F(TasksTest, MultipleRunsAreOneBatchAndComeBackToTheirModelValues) {
@@ -81,14 +86,28 @@ TEST_F(TasksTest, MoreSetsThatCannotBeRunThanMayFailAreToldBeforeTheFirstModelRu
                   "   No. 1: constraint 1 (a < 5)\n"
                   "   The run will end before it is complete: at most 3 may fail, a tenth of the 30 planned"));
 
+  UncertaintyTask uncertainty;
+  uncertainty.settings = {SamplingType::simpleRandom, 50, {{4.0, 2.0}, {0.0, 1.0}, {2.0, 1.0}}};
+  evaluator_.batches.clear();
+  run(uncertainty);
+  ASSERT_EQ(warnings_.size(), 2U);
+  EXPECT_THAT(warnings_[1], AllOf(HasSubstr(" of 50 sets of the sample, "), HasSubstr("Redraw_Infeasible = 1")));
+  uncertainty.settings.redrawsInfeasible = true;
+  evaluator_.batches.clear();
+  run(uncertainty);
+  EXPECT_EQ(warnings_.size(), 2U);
+  for (const ParameterSet& set : evaluator_.batches.at(0)) EXPECT_TRUE(feasibility_.holds(set));
+  EXPECT_THAT(report_.at(1), ::testing::MatchesRegex("Redraw_Infeasible: 50 sets that can be run out of [0-9]+ drawn, "
+                                                     "an acceptance rate of [0-9.]+ %"));
+
   OptimisationTask optimisation;  // from initial values that violate it
   space_.initial[0] = 9.0;
   optimisation.method = searchMethods().make(SetupValue(2));
   optimisation.stopping = {.maxEvaluations = 9, .minChange = 0.0};
   evaluator_.batches.clear();
   run(optimisation);
-  ASSERT_EQ(warnings_.size(), 2U);
-  EXPECT_THAT(warnings_[1], StartsWith("Constraints are violated by 1 of 1 given sets of the initial sample, "));
+  ASSERT_EQ(warnings_.size(), 3U);
+  EXPECT_THAT(warnings_[2], StartsWith("Constraints are violated by 1 of 1 given sets of the initial sample, "));
 }
 
 TEST_F(TasksTest, AnUnknownUseOfASurrogateModelRunsNothingAndEndsNormally) {
