@@ -52,7 +52,7 @@ void FeasiblePoints::replaceInSample(std::vector<ParameterSet>& sample, std::siz
       remaining.push_back(i);
     }
   }
-  if (!known_ && unusable.empty()) known_ = drawWithin(bounds, random);
+  while (!known_ && drawsLeft_ > 0) known_ = drawWithin(bounds, random);
   if (!known_) {
     const ParameterSet& last = sample.empty() ? bounds.initial : sample.back();
     fatalError(

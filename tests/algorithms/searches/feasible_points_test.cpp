@@ -75,7 +75,7 @@ TEST(FeasiblePoints, RefuseASampleBeforeItIsEvaluatedWhereNoneCanBeFound) {
   EXPECT_EQ(
       refusalOf([&] { FeasiblePoints(sumBelow(-1)).replaceInSample(sample, 0, kBounds, random); }),
       "Error: No parameter set found that satisfies the constraints\n"
-      "20002 sets drawn between the bounds cannot be run, nor can the initial values; one of them: sum too large");
+      "1000002 sets drawn between the bounds cannot be run, nor can the initial values; one of them: sum too large");
   // The initial set, although it is not in the sample, is the only one known.
   FeasiblePoints tiny(sumBelow(1e-9));
   SearchBounds bounds = kBounds;
