@@ -273,7 +273,9 @@ TaskContext RunDriver::taskContext() {
           [this](const SearchSummary& summary) { reporter_->takeBestOf(summary); },
           filePrefix_,
           runner_->observedSeries(),
-          widestPlaceholders(runner_->templates(), config_.parameters.size())};
+          widestPlaceholders(runner_->templates(), config_.parameters.size()),
+          parameters_->feasibility(),
+          [this](std::string_view text) { warn(text); }};
 }
 
 TaskOutcome RunDriver::runTask() {
@@ -459,7 +461,7 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
     if (!detail.empty()) text.append("\n").append(detail);
     if (reporter_ && reporter_->failedCount() > 0)
       text +=
-          fmt::format("\nfailed model runs are described in {}", fileNameOf(results_->failedRuns().paths().forPeople));
+          fmt::format("\nfailed evaluations are described in {}", fileNameOf(results_->failedRuns().paths().forPeople));
     if (!isAccepted_) state_.log.markRefused();
     showMessage(text);
     statistics = keepStatistics();

@@ -107,15 +107,18 @@ TEST_F(LocalEvaluatorTest, SetsThatCannotBeRunAreNotStarted) {
   LocalEvaluator& evaluator = makeEvaluator(launcher, 1, 100);
   const auto results = evaluate(evaluator, {9.5, 5.0, 2.0});
   EXPECT_EQ(launcher.starts, 1);
-  EXPECT_THAT(
-      observer_.events,
-      ElementsAre("Evaluation of parameter set No. 1 completed: FAILED - parameter constraints violated",
-                  "record 1 a=9.5 FAILED", "Evaluation of parameter set No. 2 completed: FAILED - model run error",
-                  "record 2 a=5 FAILED", "Evaluation of parameter set No. 3 initiated",
-                  "Evaluation of parameter set No. 3 completed: OK", "record 3 a=2 OK"));
+  EXPECT_THAT(observer_.events,
+              ElementsAre("Evaluation of parameter set No. 1 completed: FAILED - parameter constraints violated",
+                          "record 1 a=9.5 FAILED",
+                          "Evaluation of parameter set No. 2 completed: FAILED - parameter constraints violated",
+                          "record 2 a=5 FAILED", "Evaluation of parameter set No. 3 initiated",
+                          "Evaluation of parameter set No. 3 completed: OK", "record 3 a=2 OK"));
   EXPECT_EQ(results[0].failure->kind, EvaluationFailure::Kind::constraintsViolated);
   EXPECT_THAT(results[1].failure->reason, HasSubstr("inverse"));
   EXPECT_EQ(failedRuns_->failedCount(), 2);
+  EXPECT_THAT(
+      refusalOf([&] { evaluate(makeEvaluator(launcher, 1, 9), {9.5}); }),
+      HasSubstr("\nfailed evaluations: 1, 1 of them not run as they violate the constraints; at most 0 may fail"));
 }
 
 TEST_F(LocalEvaluatorTest, CancellationHaltsWhatRunsAndStartsNothing) {

@@ -8,11 +8,14 @@
 #include <fmt/core.h>
 
 #include "algorithms/numbers/uniform_generator.h"
+#include "common/fatal_error.h"
 #include "common/run_files.h"
 
 namespace mirevo {
 
 namespace {
+
+constexpr int kMostRedraws = 1'000'000;  // of one set
 
 /// Replaces deviate i by a random value in the stratum (pi_i - 1, pi_i) / N, where pi_i is its rank among the deviates,
 /// from 1; ties by index.
@@ -75,7 +78,13 @@ const SettingSection<UncertaintySection>& uncertaintySection() {
                                      .meaning = "Parameter sets that are drawn."}),
         setting<UncertaintySection>(
             [](auto& s) -> auto& { return s.randomSeed; },
-            {.name = "Random_Seed", .defaultValue = "1", .meaning = "Seed of the run; its sign does not matter."})}}};
+            {.name = "Random_Seed", .defaultValue = "1", .meaning = "Seed of the run; its sign does not matter."}),
+        setting<UncertaintySection>(
+            [](auto& s) -> auto& { return s.settings.redrawsInfeasible; },
+            {.name = "Redraw_Infeasible",
+             .defaultValue = "0",
+             .meaning = "1: sets that violate a constraint are drawn again until all sets can be run. 0: they are not "
+                        "run and count as failed."})}}};
   return section;
 }
 
@@ -98,9 +107,10 @@ const SettingSection<NormalDistribution>& distributionSection() {
   return section;
 }
 
-std::vector<ParameterSet> uncertaintySample(const UncertaintySettings& settings, std::int32_t seed,
-                                            const MessageSink& messages) {
-  UniformGenerator random(seed);
+namespace {
+
+std::vector<ParameterSet> drawSample(const UncertaintySettings& settings, UniformGenerator& random,
+                                     const MessageSink& messages) {
   const auto n = static_cast<std::size_t>(std::max(settings.sampleSize, 0));
   std::vector<ParameterSet> sample(n, ParameterSet(settings.parameters.size()));
   std::vector<double> deviates(n);
@@ -117,12 +127,39 @@ std::vector<ParameterSet> uncertaintySample(const UncertaintySettings& settings,
   return sample;
 }
 
-UncertaintyOutcome uncertaintyAnalysis(const UncertaintySettings& settings, std::int32_t seed, Evaluator& evaluator,
-                                       const MessageSink& messages,
-                                       const std::function<void(std::span<const ParameterSet>)>& drawn) {
-  UncertaintyOutcome outcome;
-  if (!settings.parameters.empty()) outcome.sample = uncertaintySample(settings, seed, messages);
-  if (drawn) drawn(outcome.sample);
+}  // namespace
+
+std::vector<ParameterSet> uncertaintySample(const UncertaintySettings& settings, std::int32_t seed,
+                                            const MessageSink& messages) {
+  UniformGenerator random(seed);
+  return drawSample(settings, random, messages);
+}
+
+FeasibleSample feasibleUncertaintySample(const UncertaintySettings& settings, std::int32_t seed,
+                                         const Feasibility& feasibility, const MessageSink& messages) {
+  UniformGenerator random(seed);
+  FeasibleSample sample{drawSample(settings, random, messages)};
+  sample.drawnCount = static_cast<std::int64_t>(sample.sets.size());
+  UncertaintySettings single = settings;
+  single.samplingType = SamplingType::simpleRandom;
+  single.sampleSize = 1;
+  for (ParameterSet& set : sample.sets) {
+    std::optional<std::string> violation = feasibility.violation(set);
+    for (int redraws = 0; violation; ++redraws) {
+      if (redraws == kMostRedraws) {
+        fatalError("Error: No parameter set found that satisfies the constraints",
+                   fmt::format("none of {} drawn one after the other; the last one: {}", redraws, *violation));
+      }
+      set = std::move(drawSample(single, random, messages).front());
+      ++sample.drawnCount;
+      violation = feasibility.violation(set);
+    }
+  }
+  return sample;
+}
+
+UncertaintyOutcome uncertaintyAnalysis(std::vector<ParameterSet> sample, Evaluator& evaluator) {
+  UncertaintyOutcome outcome{std::move(sample), {}};
   outcome.results = evaluator.evaluateParameterSets(outcome.sample, DispatchMode::task);
   return outcome;
 }

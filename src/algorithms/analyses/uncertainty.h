@@ -13,6 +13,7 @@
 #include "common/parameter_set.h"
 #include "common/settings/keyword_row.h"
 #include "evaluation/evaluator.h"
+#include "parameters/feasibility.h"
 #include "parameters/search_space.h"
 
 namespace mirevo {
@@ -30,6 +31,7 @@ struct UncertaintySettings {
   SamplingType samplingType = SamplingType::simpleRandom;
   std::int32_t sampleSize = 0;                 ///< N, at least 2
   std::vector<NormalDistribution> parameters;  ///< one per variable parameter, in setup order
+  bool redrawsInfeasible = false;              ///< whether sets that cannot be run are drawn again
 };
 
 /// The section UNCERTAINTY_ESTIMATION, and the seed of the run, which the initial sample sets, too.
@@ -46,18 +48,27 @@ const SettingSection<NormalDistribution>& distributionSection();
 std::vector<ParameterSet> uncertaintySample(const UncertaintySettings& settings, std::int32_t seed,
                                             const MessageSink& messages = {});
 
+/// A sample of sets that can be run.
+struct FeasibleSample {
+  std::vector<ParameterSet> sets;
+  std::int64_t drawnCount = 0;  ///< sets that were drawn for it
+};
+
+/// The uncertaintySample() whose sets that cannot be run are replaced by further ones: the stream goes on behind the
+/// sample, with one deviate for each parameter in setup order, whatever the type of sampling. Throws FatalError "Error:
+/// No parameter set found that satisfies the constraints" if none of a million drawn for one of them can be run.
+FeasibleSample feasibleUncertaintySample(const UncertaintySettings& settings, std::int32_t seed,
+                                         const Feasibility& feasibility, const MessageSink& messages = {});
+
 /// The sets of an uncertainty analysis and their results, in the same order.
 struct UncertaintyOutcome {
   std::vector<ParameterSet> sample;
   std::vector<EvaluationResult> results;
 };
 
-/// Draws the sample and evaluates it in one batch (an empty one where there is no variable parameter). The scale of the
-/// objective functions is not taken from the sample: no aggregate is used here, and a constant objective function must
-/// not end the analysis. `drawn` receives the sample before it is evaluated.
-UncertaintyOutcome uncertaintyAnalysis(const UncertaintySettings& settings, std::int32_t seed, Evaluator& evaluator,
-                                       const MessageSink& messages = {},
-                                       const std::function<void(std::span<const ParameterSet>)>& drawn = {});
+/// Evaluates the sample in one batch. The scale of the objective functions is not taken from it: no aggregate is used
+/// here, and a constant objective function must not end the analysis.
+UncertaintyOutcome uncertaintyAnalysis(std::vector<ParameterSet> sample, Evaluator& evaluator);
 
 /// Names of what an analysis reports, for its tables; each list in setup order.
 struct AnalysisNames {

@@ -42,6 +42,7 @@ class OptimisationTask final : public Task {
   void readMethod(const TaskReading& reading, const SetupSection& section) const;
   void readStopping(const SetupSection& section);
   void readSurrogate(const TaskReading& reading, const SetupSection& section, const SetupSection& stoppingSection);
+  void warnOfGivenSets(const TaskContext& context, const SearchProblem& problem) const;
   SearchSummary search(const TaskContext& context) const;
 
   std::vector<EarlierSearch> earlierSearches_;

@@ -18,6 +18,7 @@
 #include "measures/objective_functions.h"
 #include "measures/observed_series.h"
 #include "measures/output_measure.h"
+#include "parameters/feasibility.h"
 #include "parameters/search_space.h"
 #include "run/access/setup_access.h"
 #include "run/progress/run_log.h"
@@ -58,6 +59,9 @@ struct TaskContext {
   std::span<const ObservedSeries> observedSeries = {};
   /// By model parameter, the width of the widest placeholder into which it is written; 0: none.
   std::vector<int> fieldWidths = {};
+  Feasibility feasibility = {};  ///< which sets can be run, of a model with constraints
+  /// Shows the user a warning that the log receives as well. May be empty.
+  std::function<void(std::string_view)> warnUser = {};
 };
 
 /// A file beside the results.

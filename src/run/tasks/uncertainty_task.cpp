@@ -5,6 +5,7 @@
 #include "algorithms/analyses/sampled_distributions.h"
 #include "algorithms/analyses/series_band.h"
 #include "run/tasks/analysis_names.h"
+#include "run/tasks/infeasible_sets.h"
 
 namespace mirevo {
 namespace {
@@ -84,11 +85,32 @@ std::vector<std::string> UncertaintyTask::warnings(const SearchSpace& space) con
   return distributionWarnings(settings, space);
 }
 
+/// `acceptance`: a line on the sets drawn, if any can be drawn again.
+std::vector<ParameterSet> UncertaintyTask::drawSample(const TaskContext& context, std::string& acceptance) const {
+  if (settings.parameters.empty()) return {};
+  const auto messages = [&](std::string_view text) { context.log.line(text); };
+  if (!settings.redrawsInfeasible) {
+    std::vector<ParameterSet> sample = uncertaintySample(settings, randomSeed, messages);
+    warnOfInfeasibleSets(context, sample, "sets of the sample", settings.sampleSize,
+                         "With Redraw_Infeasible = 1 in UNCERTAINTY_ESTIMATION sets are drawn until all can be run");
+    return sample;
+  }
+  FeasibleSample sample = feasibleUncertaintySample(settings, randomSeed, context.feasibility, messages);
+  const auto kept = static_cast<double>(sample.sets.size());
+  acceptance =
+      fmt::format("Redraw_Infeasible: {} sets that can be run out of {} drawn, an acceptance rate of {:.1f} %",
+                  sample.sets.size(), sample.drawnCount, 100.0 * kept / static_cast<double>(sample.drawnCount));
+  context.log.line(acceptance);
+  return std::move(sample.sets);
+}
+
 TaskOutcome UncertaintyTask::run(const TaskContext& context) {
-  const UncertaintyOutcome found = uncertaintyAnalysis(
-      settings, randomSeed, context.evaluator, [&](std::string_view text) { context.log.line(text); },
-      [&](std::span<const ParameterSet> sample) { context.log.line(setsOutsideBounds(sample, context.space)); });
+  std::string acceptance;
+  std::vector<ParameterSet> sample = drawSample(context, acceptance);
+  context.log.line(setsOutsideBounds(sample, context.space));
+  const UncertaintyOutcome found = uncertaintyAnalysis(std::move(sample), context.evaluator);
   TaskOutcome outcome = outcomeOf(context, found);
+  if (!acceptance.empty()) outcome.report.insert(outcome.report.begin() + 1, acceptance);
   logReport(context, outcome.report);
   return outcome;
 }

@@ -22,6 +22,9 @@ class UncertaintyTask final : public Task {
   TaskReport report() const override { return {.hasBands = true}; }
 
   UncertaintySettings settings;
+
+ private:
+  std::vector<ParameterSet> drawSample(const TaskContext& context, std::string& acceptance) const;
 };
 
 }  // namespace mirevo
