@@ -15,6 +15,9 @@ struct RunFile {
   std::string_view extension;
   bool isNumbered = false;   ///< a number follows the stem
   bool mayBeModels = false;  ///< so plain a name that only the content tells it from a file of the model
+  /// What the first lines of every such file contain, in every version of the program. Empty: nothing, and the name is
+  /// so peculiar that it is taken for a run's.
+  std::string_view mark = "# Mirevo ";
 
   bool operator==(const RunFile&) const = default;
 };
@@ -32,13 +35,13 @@ struct ResultFileNames {
 /// The names of all that a run makes. Nothing else builds such a name.
 namespace run_files {
 
-inline constexpr RunFile kLog{"", ".log", false, true};
-inline constexpr RunFile kTerminationLog{"_Termination", ".log"};
-inline constexpr RunFile kMessages{"", "._spi_"};
-inline constexpr RunFile kKill{"", "._kill_"};
+inline constexpr RunFile kLog{"", ".log", false, true, "Mirevo "};
+inline constexpr RunFile kTerminationLog{"_Termination", ".log", false, false, ""};
+inline constexpr RunFile kMessages{"", "._spi_", false, false, ""};
+inline constexpr RunFile kKill{"", "._kill_", false, false, ""};
 inline constexpr RunFile kSeries{"_Series", ".dat"};
-inline constexpr RunFile kReport{"_Report", ".html"};
-inline constexpr RunFile kBand{"_Band_", ".csv", true};
+inline constexpr RunFile kReport{"_Report", ".html", false, false, "content=\"default-src 'none'; script-src"};
+inline constexpr RunFile kBand{"_Band_", ".csv", true, false, "# Band of "};
 inline constexpr RunFile kSavedFolder{"_Saved", ""};
 /// These two stand beside the setup, or in the folder that it names for them.
 inline constexpr RunFile kFailedFolder{"_Failed", "", true};
@@ -46,8 +49,8 @@ inline constexpr RunFile kProcessFolder{"_Process", "", true};
 
 /// What keeps a second run away (common/file_lock): from the files with the setup's name, and from the process folders,
 /// beside which it lies; the runs of a job share that.
-inline constexpr RunFile kRunLock{"", "._lock_"};
-inline constexpr RunFile kProcessLock{"_Process", "._lock_"};
+inline constexpr RunFile kRunLock{"", "._lock_", false, false, ""};
+inline constexpr RunFile kProcessLock{"_Process", "._lock_", false, false, ""};
 
 /// Tables of analyses.
 inline constexpr RunFile kCovariance{"_Covariance", ".dat", false, true};
@@ -60,22 +63,38 @@ inline constexpr RunFile kSampleCorrelation{"_SampleCorrelation", ".dat", false,
 inline constexpr std::array kUncertaintyTables{kQuantiles, kSampleCorrelation};
 inline constexpr std::array kSensitivityTables{kCovariance, kCorrelation, kParameterLimits, kJacobian, kSensitivities};
 
+inline constexpr std::string_view kRestartMark = "# What the results beside this file depend on";
+inline constexpr std::string_view kSimulatedMark = "v0veriM";  ///< its number's bytes, without the version
+
 /// Scenario runs and the uncertainty analysis.
-inline constexpr ResultFileNames kPlain{
-    {"", ".dat", false, true},          {"_Restart", ".dat"}, {"_Simulated", ".bin"}, {"_Run", ".dat", false, true},
-    {"_Failures", ".dat", false, true}, kUncertaintyTables};
-inline constexpr ResultFileNames kSensitivity{{"_Sensitivity", ".dat"},           {"_Sensitivity_Restart", ".dat"},
-                                              {"_Sensitivity_Simulated", ".bin"}, {"_Sensitivity_Run", ".dat"},
-                                              {"_Sensitivity_Failures", ".dat"},  kSensitivityTables};
-inline constexpr ResultFileNames kOptimisation{{"_Optimisation", ".dat"},           {"_Optimisation_Restart", ".dat"},
-                                               {"_Optimisation_Simulated", ".bin"}, {"_Optimisation_Run", ".dat"},
-                                               {"_Optimisation_Failures", ".dat"},  {}};
+inline constexpr ResultFileNames kPlain{{"", ".dat", false, true},
+                                        {"_Restart", ".dat", false, false, kRestartMark},
+                                        {"_Simulated", ".bin", false, false, kSimulatedMark},
+                                        {"_Run", ".dat", false, true},
+                                        {"_Failures", ".dat", false, true},
+                                        kUncertaintyTables};
+inline constexpr ResultFileNames kSensitivity{{"_Sensitivity", ".dat"},
+                                              {"_Sensitivity_Restart", ".dat", false, false, kRestartMark},
+                                              {"_Sensitivity_Simulated", ".bin", false, false, kSimulatedMark},
+                                              {"_Sensitivity_Run", ".dat"},
+                                              {"_Sensitivity_Failures", ".dat"},
+                                              kSensitivityTables};
+inline constexpr ResultFileNames kOptimisation{{"_Optimisation", ".dat"},
+                                               {"_Optimisation_Restart", ".dat", false, false, kRestartMark},
+                                               {"_Optimisation_Simulated", ".bin", false, false, kSimulatedMark},
+                                               {"_Optimisation_Run", ".dat"},
+                                               {"_Optimisation_Failures", ".dat"},
+                                               {}};
 
 /// Stands beside the setup without its name, for the run that was the first of those going on in the folder; another
 /// has a file of its own.
-inline constexpr RunFile kFailedRuns{"calSimErr", ".dat"};
-inline constexpr RunFile kFailedRunsLock{"calSimErr", "._lock_"};
-inline constexpr RunFile kOwnFailedRuns{"_calSimErr", ".dat"};
+inline constexpr RunFile kFailedRuns{"calSimErr", ".dat", false, false, "# Failed evaluations of "};
+inline constexpr RunFile kFailedRunsLock{"calSimErr", "._lock_", false, false, ""};
+inline constexpr RunFile kOwnFailedRuns{"_calSimErr", ".dat", false, false, "# Failed evaluations of "};
+
+/// The file in a process folder that receives the output of its batch; every process folder has one, and every copy of
+/// one.
+inline constexpr char kBatchLog[] = "mirevo_batch.log";
 
 }  // namespace run_files
 
@@ -88,6 +107,15 @@ std::string runFilePath(std::string_view prefix, const RunFile& file);
 std::string runFilePath(std::string_view prefix, const RunFile& file, int number);
 /// That of a file beside the setup without its name, `calSimErr.dat`.
 std::string pathBeside(std::string_view prefix, const RunFile& file);
+/// Whether the first lines of the file are those of a run's.
+bool carriesMark(const std::string& path, const RunFile& file);
+/// Why a run must not rename, replace or remove what is at `path`, as a sentence with the remedy. Empty where it may:
+/// there is nothing, a device, a file that carries the mark or has no more than a part of the head; for the folders of
+/// runs, one that is empty or holds what only theirs do.
+std::string whyNotReplaceable(const std::string& path, const RunFile& file);
+/// Throws FatalError, with `path` and that sentence, unless it may be replaced.
+void requireReplaceable(const std::string& path, const RunFile& file);
+
 /// The file's name without a folder, for messages: `calSimErr.dat`, `basin_Failures.dat`.
 std::string fileNameOf(std::string_view path);
 

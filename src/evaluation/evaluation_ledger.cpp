@@ -7,7 +7,7 @@
 namespace mirevo {
 
 void EvaluationLedger::begin(std::span<const ParameterSet> sets, DispatchMode mode) {
-  sets_ = sets;
+  sets_.assign(sets.begin(), sets.end());
   results_.assign(sets.size(), {});
   isFinished_.assign(sets.size(), false);
   next_ = 0;
@@ -26,10 +26,10 @@ void EvaluationLedger::replay(std::size_t place, EvaluationResult result) {
 
 /// Stores and counts a result that has been reported.
 void EvaluationLedger::store(std::size_t place, EvaluationResult result) {
-  if (!result.ok()) failedRuns_.countFailure(result.number, *result.failure);
-  results_[place] = std::move(result);
+  const EvaluationResult& stored = results_[place] = std::move(result);
   isFinished_[place] = true;
   ++finishedCount_;
+  if (!stored.ok()) failedRuns_.countFailure(stored.number, *stored.failure);
 }
 
 std::optional<std::size_t> EvaluationLedger::takeNext() {
@@ -53,8 +53,8 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
   }
   std::string_view outcome = progress::kOk;
   if (!result.ok()) {
-    outcome = result.failure->kind == EvaluationFailure::Kind::constraintsViolated ? progress::kConstraintsViolated
-                                                                                   : progress::kModelRunError;
+    // A set that was not run is never a model run error, even if it is an equation that has no finite value.
+    outcome = result.failure->isOfModelRun() ? progress::kModelRunError : progress::kConstraintsViolated;
   }
   std::optional<EvaluationResult> known;  // a repeated run has its row already, which is kept
   if (earlier_ != nullptr) known = earlier_->take(result.number, sets_[place]);
@@ -86,6 +86,17 @@ std::vector<EvaluationResult> EvaluationLedger::end() {
   next_ = 0;
   finishedCount_ = 0;
   return std::exchange(results_, {});
+}
+
+UnfinishedBatch EvaluationLedger::takeUnfinished() {
+  UnfinishedBatch unfinished;
+  for (std::size_t place = 0; place < sets_.size(); ++place) {
+    if (!isFinished_[place]) continue;
+    unfinished.sets.push_back(std::move(sets_[place]));
+    unfinished.results.push_back(std::move(results_[place]));
+  }
+  end();
+  return unfinished;
 }
 
 void settleAggregates(ObjectiveAggregator& aggregator, std::span<EvaluationResult> sample,

@@ -28,7 +28,7 @@ class EvaluationLedger final {
                    EqualMeasures equalMeasures = {})
       : observer_(observer), failedRuns_(failedRuns), earlier_(earlier), equalMeasures_(std::move(equalMeasures)) {}
 
-  /// Opens the next batch of the run; `place` below is the 0-based index of a set in it. `sets` must outlive the batch.
+  /// Opens the next batch of the run; `place` below is the 0-based index of a set in it.
   /// Sets that an earlier run has evaluated get their results at once, unless `mode` requires their model runs. Throws
   /// FatalError when the failed-run limit is exceeded, and if an earlier evaluation was of another set.
   void begin(std::span<const ParameterSet> sets, DispatchMode mode);
@@ -50,6 +50,8 @@ class EvaluationLedger final {
   /// Closes a complete batch and returns one result per set, in order. Warns if no model run so far depends on the
   /// parameters.
   std::vector<EvaluationResult> end();
+  /// Evaluator::takeUnfinished(); no batch is open afterwards.
+  UnfinishedBatch takeUnfinished();
 
  private:
   /// Warns of each measure for which this run has values for fewer observations than any run before.
@@ -62,7 +64,7 @@ class EvaluationLedger final {
   EarlierEvaluations* earlier_;
   EqualMeasures equalMeasures_;
   bool isFinalRun_ = false;
-  std::span<const ParameterSet> sets_;
+  std::vector<ParameterSet> sets_;  ///< the ledger's own: an unfinished batch outlives its caller
   std::vector<EvaluationResult> results_;
   std::vector<bool> isFinished_;                   ///< whether a set has its result
   std::size_t next_ = 0;                           ///< first set that was not taken

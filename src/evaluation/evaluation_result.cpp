@@ -12,9 +12,10 @@ struct KindNames {
 };
 
 /// In the order of the kinds. The keys are used in files and never change; the names are for people.
-constexpr std::array<KindNames, 10> kKinds = {{
+constexpr std::array<KindNames, 11> kKinds = {{
     {"constraintsViolated", "parameter constraints violated"},
     {"equationNotFinite", "equation without a finite value"},
+    {"valueNotWritable", "value that cannot be written in its field"},
     {"couldNotStart", "batch could not be started"},
     {"exitCode", "batch ended with an exit code"},
     {"signal", "batch ended by a signal"},

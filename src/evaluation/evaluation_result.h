@@ -18,6 +18,7 @@ struct EvaluationFailure {
   enum class Kind {
     constraintsViolated,
     equationNotFinite,
+    valueNotWritable,
     couldNotStart,
     exitCode,
     signal,
@@ -32,7 +33,9 @@ struct EvaluationFailure {
   std::vector<std::string> lastOutput;  ///< the last lines that the batch printed
 
   /// Whether the model was run, or should have been: its folder may then tell more.
-  bool isOfModelRun() const { return kind != Kind::constraintsViolated && kind != Kind::equationNotFinite; }
+  bool isOfModelRun() const {
+    return kind != Kind::constraintsViolated && kind != Kind::equationNotFinite && kind != Kind::valueNotWritable;
+  }
 };
 
 /// The name of a kind of failure for people, "batch ran too long".
@@ -56,7 +59,8 @@ struct EvaluationResult {
   std::vector<double> objectiveValues;  ///< one per objective function
   double aggregate = kFailedRunValue;   ///< what the searches minimise
   /// If the task asks for them, the simulated values at the observation times of ModelRunner::observedSeries(), one
-  /// series after another, NaN where the model has none. Empty for a failed evaluation.
+  /// series after another, NaN where the model has none; exact ones with their units, see appendSimulatedValues().
+  /// Empty for a failed evaluation.
   std::vector<double> simulatedValues;
   /// For an evaluation that may be shown as the initial or the best one, its simulated series, one per measure of
   /// ModelRunner::shownMeasures(). Empty for all others, and once the evaluation has been reported.

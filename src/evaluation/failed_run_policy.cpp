@@ -9,10 +9,13 @@ namespace mirevo {
 void FailedRunPolicy::countFailure(int number, const EvaluationFailure& failure) {
   if (isFolderWanted(failure)) --foldersLeft_;
   ++failedCount_;
+  if (!failure.isOfModelRun()) ++notRunCount_;
   if (failedCount_ <= limit_) return;
+  const std::string notRun =
+      notRunCount_ == 0 ? "" : fmt::format(", {} of them not run as they violate the constraints", notRunCount_);
   std::string detail = fmt::format(
-      "failed evaluations: {}; at most {} may fail, a tenth of the {} planned\nthe last of them, No. {}: {}",
-      failedCount_, limit_, planned_, number, failure.reason);
+      "failed evaluations: {}{}; at most {} may fail, a tenth of the {} planned\nthe last of them, No. {}: {}",
+      failedCount_, notRun, limit_, planned_, number, failure.reason);
   for (const std::string& line : failure.lastOutput) detail += "\n| " + line;
   fatalError("Error: Unable to continue. No of failed simulations too high.", detail);
 }

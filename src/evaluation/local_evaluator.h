@@ -23,6 +23,7 @@ class LocalEvaluator final : public Evaluator {
                  EarlierEvaluations* earlier = nullptr);
 
   std::vector<EvaluationResult> evaluateParameterSets(std::span<const ParameterSet> sets, DispatchMode mode) override;
+  UnfinishedBatch takeUnfinished() override { return ledger_.takeUnfinished(); }
   void settleAggregates(std::span<EvaluationResult> sample) override;
 
  private:

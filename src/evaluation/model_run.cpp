@@ -16,6 +16,7 @@
 #include "common/fatal_error.h"
 #include "common/file_copy.h"
 #include "common/files.h"
+#include "common/run_files.h"
 #include "common/text.h"
 #include "measures/measure_file.h"
 #include "parameters/read_template.h"
@@ -169,16 +170,25 @@ std::string ModelRunner::slotPath(const std::string& baseFile, int slot) const {
   return launcher_.getProcessFolder(slot) + std::string(trimTrailing(baseFile).substr(description_.baseFolder.size()));
 }
 
+std::optional<EvaluationFailure> ModelRunner::findUnwritable(std::span<const double> modelValues) const {
+  for (const ParameterTemplate& parameterTemplate : templates_) {
+    std::string reason = parameterTemplate.unwritableValue(modelValues, parameters_.parameters());
+    if (!reason.empty()) return EvaluationFailure{Kind::valueNotWritable, std::move(reason), {}};
+  }
+  return std::nullopt;
+}
+
 std::optional<EvaluationFailure> ModelRunner::findUnrunnable(std::span<const double> set) {
   const auto mapped = parameters_.MapToModelValues(set);
   if (const auto* failure = std::get_if<ParameterFailure>(&mapped)) return parameterFailure(*failure);
-  return std::nullopt;
+  return findUnwritable(std::get<std::span<const double>>(mapped));
 }
 
 std::optional<EvaluationFailure> ModelRunner::prepareModelRun(std::span<const double> set, int slot) {
   const auto mapped = parameters_.MapToModelValues(set);
   if (const auto* failure = std::get_if<ParameterFailure>(&mapped)) return parameterFailure(*failure);
   const auto modelValues = std::get<std::span<const double>>(mapped);
+  if (auto failure = findUnwritable(modelValues)) return failure;
   const SlotFiles& files = slots_.at(static_cast<std::size_t>(slot - 1));
   // Files of an earlier run must never be taken for results of this one.
   for (const std::string& path : files.simulationFiles) removeFile(path);
@@ -265,7 +275,7 @@ void ModelRunner::keepFailedFolder(int slot, int number, std::vector<std::string
   std::string reason;
   try {
     makeProcessFolder(folder, kept, processFolderPrefix_);
-    const std::string log = std::string("/") + kBatchLogName;  // not part of the model, so not copied with it
+    const std::string log = std::string("/") + run_files::kBatchLog;  // not part of the model, so not copied with it
     struct stat status {};
     const bool hasLog = ::stat((folder + log).c_str(), &status) == 0 || errno != ENOENT;
     if (!hasLog || copyWhole(folder + log, kept + log, reason)) return;

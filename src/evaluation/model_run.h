@@ -92,6 +92,8 @@ class ModelRunner final {
   void requireFilesInBaseFolder() const;
   /// Returns one text per parameter file: that of a converted numeric-ID template, empty for the others.
   std::vector<std::string> readTemplates();
+  /// The failure of a set with a value that a template has no form for; empty when all can be written.
+  std::optional<EvaluationFailure> findUnwritable(std::span<const double> modelValues) const;
   std::string slotPath(const std::string& baseFile, int slot) const;
   void updateResistanceNumbers(const std::string& path);
   EvaluationResult judge(int slot);

@@ -31,23 +31,35 @@ ObservedSeries readObservedSeries(std::size_t index, const OutputMeasure& measur
   return observed;
 }
 
+std::size_t simulatedValueCount(std::span<const ObservedSeries> observed, SeriesPrecision precision) {
+  std::size_t count = 0;
+  for (const ObservedSeries& series : observed) count += series.values.size();
+  return precision == SeriesPrecision::exact ? 2 * count : count;
+}
+
 void appendSimulatedValues(const ObservedSeries& observed, const OutputMeasure& measure, SeriesPrecision precision,
                            TimeSeriesObject& simulation, std::vector<double>& values) {
   requireItem(simulation, measure.simulation);
   const std::optional<DateRecord> start = simulation.startTime();
   const double offset = start ? daysSince(*start, observed.start) : 0.0;
-  std::size_t hint = 0;
-  std::span<const double> exact;
-  if (precision == SeriesPrecision::exact) exact = simulation.exactValues(measure.simulation.itemNo);
-  for (const double days : observed.days) {
-    std::optional<double> value;
-    if (start && precision == SeriesPrecision::exact) {
-      value = exactValueAt(simulation.times(), exact, days + offset, hint);
-    } else if (start) {
-      value = valueAt(simulation, measure.simulation.itemNo, days + offset, hint);
+  const int item = measure.simulation.itemNo;
+  const auto append = [&](const auto& valueAtTime) {
+    std::size_t hint = 0;
+    for (const double days : observed.days) {
+      const std::optional<double> value = start ? valueAtTime(days + offset, hint) : std::nullopt;
+      values.push_back(value.value_or(std::numeric_limits<double>::quiet_NaN()));
     }
-    values.push_back(value ? *value : std::numeric_limits<double>::quiet_NaN());
+  };
+  if (precision == SeriesPrecision::single) {
+    append(
+        [&](double days, std::size_t& hint) -> std::optional<double> { return valueAt(simulation, item, days, hint); });
+    return;
   }
+  const auto appendExact = [&](std::span<const double> series) {
+    append([&](double days, std::size_t& hint) { return exactValueAt(simulation.times(), series, days, hint); });
+  };
+  appendExact(simulation.exactValues(item));
+  appendExact(simulation.units(item));
 }
 
 }  // namespace mirevo

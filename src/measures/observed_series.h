@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <span>
 #include <vector>
 
 #include "common/date_record.h"
@@ -25,7 +26,11 @@ enum class SeriesPrecision { single, exact };
 ObservedSeries readObservedSeries(std::size_t index, const OutputMeasure& measure, const EvaluationPeriod& period,
                                   SeriesPrecision precision, TimeSeriesObject& observation);
 
-/// Appends the simulated value at each observation time to `values`, NaN where there is none.
+/// How many numbers appendSimulatedValues() appends for these series.
+std::size_t simulatedValueCount(std::span<const ObservedSeries> observed, SeriesPrecision precision);
+
+/// Appends the simulated value at each observation time to `values`, NaN where there is none. If exact, the unit in
+/// which the file gives each of them follows (interpolated as the values are), NaN where there is none.
 void appendSimulatedValues(const ObservedSeries& observed, const OutputMeasure& measure, SeriesPrecision precision,
                            TimeSeriesObject& simulation, std::vector<double>& values);
 

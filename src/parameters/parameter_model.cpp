@@ -51,6 +51,7 @@ class ParameterModel::Implementation {
   void assignFixedParameters();
   std::optional<ParameterFailure> assignDependentParameters();
   std::optional<ParameterFailure> checkConstraints() const;
+  bool hasConstraints() const { return !constraints_.empty(); }
 
   const std::vector<ModelParameter> parameters_;
   const SearchSpace space_;
@@ -193,6 +194,15 @@ std::variant<std::span<const double>, ParameterFailure> ParameterModel::MapToMod
   if (auto failure = implementation_->assignDependentParameters()) return *std::move(failure);
   if (auto failure = implementation_->checkConstraints()) return *std::move(failure);
   return std::span<const double>(implementation_->values_);
+}
+
+Feasibility ParameterModel::feasibility() {
+  if (!implementation_->hasConstraints()) return {};
+  return Feasibility([this](std::span<const double> set) -> std::optional<std::string> {
+    const auto mapped = MapToModelValues(set);
+    const auto* failure = std::get_if<ParameterFailure>(&mapped);
+    return failure == nullptr ? std::nullopt : std::optional(failure->detail);
+  });
 }
 
 }  // namespace mirevo

@@ -6,6 +6,7 @@
 #include <variant>
 #include <vector>
 
+#include "parameters/feasibility.h"
 #include "parameters/search_space.h"
 
 namespace mirevo {
@@ -40,6 +41,10 @@ class ParameterModel final {
   /// cannot be run: an equation without a finite value, or a violated constraint. The vector stays valid until the next
   /// call. `set` has one value per variable parameter, on the search scale.
   std::variant<std::span<const double>, ParameterFailure> MapToModelValues(std::span<const double> set);
+
+  /// Whether sets can be run, as MapToModelValues() says, whose last vector a test makes invalid; without a test if
+  /// there are no constraints. The model must outlive it.
+  Feasibility feasibility();
 
  private:
   class Implementation;

@@ -117,6 +117,17 @@ std::string ParameterTemplate::fill(std::span<const double> modelValues) const {
   return content;
 }
 
+std::string ParameterTemplate::unwritableValue(std::span<const double> modelValues,
+                                               std::span<const ModelParameter> parameters) const {
+  const auto found = std::find_if(placeholders_.begin(), placeholders_.end(), [modelValues](const Placeholder& one) {
+    return !isWritable(modelValues[one.parameter]);
+  });
+  if (found == placeholders_.end()) return {};
+  return fmt::format("the value {} of parameter \"{}\" cannot be written in its field, {}:{}",
+                     formatReal(modelValues[found->parameter]), trimTrailing(parameters[found->parameter].name),
+                     templateName_, found->line);
+}
+
 std::vector<std::size_t> ParameterTemplate::parametersNamed() const {
   std::vector<std::size_t> indices;
   for (const Placeholder& placeholder : placeholders_) indices.push_back(placeholder.parameter);

@@ -53,6 +53,9 @@ class ParameterTemplate final {
   /// The parameter file's content for a full parameter vector. Every line ends in LF and has no trailing blanks.
   std::string fill(std::span<const double> modelValues) const;
 
+  /// Which value cannot be written in its field, and where that is; empty when all can.
+  std::string unwritableValue(std::span<const double> modelValues, std::span<const ModelParameter> parameters) const;
+
   /// 0-based indices of the parameters that the template names, ascending, each once.
   std::vector<std::size_t> parametersNamed() const;
 

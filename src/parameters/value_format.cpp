@@ -14,6 +14,8 @@ namespace {
 
 /// Characters of the exponent part, such as E+05.
 constexpr std::size_t kExponentWidth = 4;
+/// Instead of a value that cannot be written.
+constexpr char kUnwritable = '*';
 
 /// Deliberately in single precision: the limits between the two forms are 10^(w-1) - 1, rounded to single precision.
 constexpr float kPowersOfTen[kMaximumValueWidth] = {1e0F,  1e1F,  1e2F,  1e3F,  1e4F,  1e5F,  1e6F,
@@ -74,12 +76,16 @@ std::string FormatValueForPlaceholder(double value, int width) {
     if (!text) text = exponentForm(value, static_cast<std::size_t>(w));
   }
   if (!text) {
-    field[0] = '*';
+    field[0] = kUnwritable;
     return field;
   }
   text->resize(std::min(text->size(), static_cast<std::size_t>(w)));
   std::copy(text->begin(), text->end(), field.begin() + (w - static_cast<std::ptrdiff_t>(text->size())));
   return field;
+}
+
+bool isWritable(double value) {
+  return FormatValueForPlaceholder(value, kMaximumValueWidth).front() != kUnwritable;
 }
 
 std::optional<double> valueAsWritten(double value, int width) {

@@ -13,6 +13,9 @@ inline constexpr int kMaximumValueWidth = 20;
 /// value whose exponent needs three digits, and one that is not a number, becomes "*" followed by blanks.
 std::string FormatValueForPlaceholder(double value, int width);
 
+/// Whether the text of a value is a number and not "*", which does not depend on the width.
+bool isWritable(double value);
+
 /// The value that a model reads from a placeholder of this width; empty if that holds no number.
 std::optional<double> valueAsWritten(double value, int width);
 

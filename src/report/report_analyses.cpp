@@ -16,6 +16,7 @@
 #include "common/files.h"
 #include "common/run_files.h"
 #include "common/text.h"
+#include "evaluation/stored_results.h"
 #include "measures/period_series.h"
 #include "parameters/template_file.h"
 #include "platform/series/time_series_object.h"
@@ -23,38 +24,22 @@
 namespace mirevo {
 namespace {
 
-/// Answers with the results of evaluations that were made before; one that is not there counts as failed.
-class EarlierResults final : public Evaluator {
- public:
-  EarlierResults(const RunConfig& config, std::span<const ResultRow> rows) {
-    for (const ResultRow& row : rows) {
-      EvaluationResult& result = results_[row.number];
-      result.number = row.number;
-      result.measureValues = row.measures;
-      result.objectiveValues = row.objectives;
-      result.aggregate = row.aggregate;
-      if (!row.ok) result.failure.emplace();
-    }
-    missing_.measureValues.assign(config.measures.size(), kFailedRunValue);
-    missing_.objectiveValues.assign(config.objectives.size(), kFailedRunValue);
-    missing_.failure.emplace();
+/// An evaluator that answers with the results in the rows; an evaluation that is not there counts as failed.
+StoredResults resultsOf(const RunConfig& config, std::span<const ResultRow> rows) {
+  std::map<int, EvaluationResult> results;
+  for (const ResultRow& row : rows) {
+    EvaluationResult& result = results[row.number];
+    result.measureValues = row.measures;
+    result.objectiveValues = row.objectives;
+    result.aggregate = row.aggregate;
+    if (!row.ok) result.failure.emplace();
   }
-
-  std::vector<EvaluationResult> evaluateParameterSets(std::span<const ParameterSet> sets,
-                                                      DispatchMode /*mode*/) override {
-    std::vector<EvaluationResult> results;
-    for (std::size_t i = 0; i < sets.size(); ++i) {
-      const auto found = results_.find(++count_);
-      results.push_back(found == results_.end() ? missing_ : found->second);
-    }
-    return results;
-  }
-
- private:
-  std::map<int, EvaluationResult> results_;  ///< by number
-  EvaluationResult missing_;
-  int count_ = 0;
-};
+  EvaluationResult missing;
+  missing.measureValues.assign(config.measures.size(), kFailedRunValue);
+  missing.objectiveValues.assign(config.objectives.size(), kFailedRunValue);
+  missing.failure.emplace();
+  return {std::move(results), std::move(missing)};
+}
 
 /// The widths of the placeholders as the run had them; a template that is no longer there has none.
 std::vector<int> fieldWidths(const RunConfig& config) {
@@ -152,7 +137,7 @@ std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, 
                                                        const SearchSpace& space, std::span<const ResultRow> rows) {
   const auto isBase = [](const ResultRow& row) { return row.number == 1 && row.ok; };
   if (std::none_of(rows.begin(), rows.end(), isBase)) return std::nullopt;
-  EarlierResults evaluator(config, rows);
+  StoredResults evaluator = resultsOf(config, rows);
   const LocalSensitivity found =
       localSensitivity(settings, space, evaluator, ofVariableParameters(fieldWidths(config), config.parameters));
   ReportedSensitivity reported;

@@ -116,7 +116,11 @@ void ReportBuilder::addRun() {
   run.message = sources_.record.message;
   run.reportMade = dateAndTimeNow();
   const RunRecord& record = sources_.record;
-  for (const std::string& text : record.warnings) note("Warning: " + text);
+  for (const std::string& text : record.warnings) {
+    const std::string warning = "Warning: " + text;
+    const bool isInSummary = std::find(data_.summary.begin(), data_.summary.end(), warning) != data_.summary.end();
+    if (!isInSummary) note(warning);
+  }
   if (const int more = record.warningCount - static_cast<int>(record.warnings.size()); more > 0) {
     note(fmt::format("{} more of {} warnings are in {}.log.", more, record.warningCount, config_.setupName));
   }
@@ -240,11 +244,20 @@ void ReportBuilder::addSeries() {
 
 void ReportBuilder::addAnalyses() {
   const bool isFinished = sources_.stage == RunStage::finished;
+  const auto& analysed = sources_.record.analysed;
+  const bool hasAnalysis = isFinished || analysed;
   const TaskReport task = config_.task->report();
-  if (task.hasBands && isFinished) data_.bands = reportedBands(config_, filePrefix_);
-  if (task.sensitivity == nullptr) return;
-  data_.sensitivity = reportedSensitivity(config_, *task.sensitivity, space(), sources_.results.rows);
-  if (!data_.sensitivity || !isFinished) return;
+  if (task.hasBands && hasAnalysis) data_.bands = reportedBands(config_, filePrefix_);
+  if (task.sensitivity != nullptr) {
+    data_.sensitivity = reportedSensitivity(config_, *task.sensitivity, space(), sources_.results.rows);
+  }
+  if (!isFinished && (analysed || data_.sensitivity)) {
+    const std::vector<bool>& ok = data_.evaluations.ok;
+    note(fmt::format("The statistics are those of an unfinished run: of {} of {} evaluations.",
+                     analysed.value_or(static_cast<int>(std::count(ok.begin(), ok.end(), true))),
+                     config_.plannedEvaluations()));
+  }
+  if (!data_.sensitivity || !hasAnalysis) return;
   takeObservationComposites(filePrefix_, *data_.sensitivity);
   std::string fault;
   data_.sensitivity->covariance = reportedCovariance(filePrefix_, fault);

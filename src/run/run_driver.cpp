@@ -1,5 +1,6 @@
 #include "run/run_driver.h"
 
+#include <algorithm>
 #include <filesystem>
 #include <new>
 #include <unistd.h>
@@ -105,6 +106,7 @@ void RunDriver::openRun(const std::string& setupFileName) {
                            setup.file, runLock_.holder(), filePrefix_));
   }
   const std::string logFile = runFilePath(filePrefix_, run_files::kLog);
+  requireReplaceable(logFile, run_files::kLog);
   const std::string keptLog = RunLog::isOfRefusedSetup(logFile) ? std::string() : keepEarlierFile(logFile);
   std::string reason;
   if (!state_.log.open(logFile, reason)) fatalError("Error: Unable to open " + logFile, reason);
@@ -158,6 +160,7 @@ void RunDriver::buildModel() {
   aggregator_ = std::make_unique<ObjectiveAggregator>(config_.objectives, config_.aggregationMethod);
   // Before the process folders are made, so that a run that cannot be continued changes nothing.
   results_.emplace(config_, parameters_->searchSpace(), filePrefix_);
+  results_->requireReplaceableFiles(config_);
   if (config_.task) config_.task->continueFrom(results_->earlierSearches());
   launcher_ = std::make_unique<PosixProcessLauncher>();
   signalState.haltProcesses = haltProcessesFromSignal;
@@ -177,6 +180,9 @@ void RunDriver::buildModel() {
 void RunDriver::logSetup() {
   state_.log.line("");
   state_.log.line(setupSummary(config_, parameters_->searchSpace(), parameters_->evaluationOrder()));
+  if (config_.task) {
+    for (const std::string& text : config_.task->warnings(parameters_->searchSpace())) state_.log.warning(text);
+  }
   for (const std::string& text : runner_->templateWarnings()) state_.log.warning(text);
   for (const std::string& text :
        unusedParameterWarnings(config_.parameters, config_.constraints, runner_->templates())) {
@@ -259,14 +265,64 @@ void RunDriver::openSeries() {
   reporter_->recordSeries(*series_);
 }
 
+TaskContext RunDriver::taskContext() {
+  return {parameters_->searchSpace(),
+          config_.parameters,
+          config_.measures,
+          config_.objectives,
+          *evaluator_,
+          state_.log,
+          [this](const SearchSummary& summary) { reporter_->takeBestOf(summary); },
+          filePrefix_,
+          runner_->observedSeries(),
+          widestPlaceholders(runner_->templates(), config_.parameters.size()),
+          parameters_->feasibility(),
+          [this](std::string_view text) { warn(text); }};
+}
+
 TaskOutcome RunDriver::runTask() {
   if (!config_.task) return {std::string(kEndOfTask)};
-  TaskOutcome outcome = config_.task->run(
-      {parameters_->searchSpace(), config_.parameters, config_.measures, config_.objectives, *evaluator_, state_.log,
-       [this](const SearchSummary& summary) { reporter_->takeBestOf(summary); }, filePrefix_, runner_->observedSeries(),
-       widestPlaceholders(runner_->templates(), config_.parameters.size())});
-  for (const TaskFile& file : outcome.files) writeBesideResults(file.path, file.content);
+  outcome_ = config_.task->run(taskContext());
+  for (const TaskFile& file : outcome_->files) writeBesideResults(file.path, file.content);
+  return *outcome_;
+}
+
+/// Marked as those of an unfinished run, unless the task itself had come to its end.
+std::optional<TaskOutcome> RunDriver::statisticsOfEarlyEnd() {
+  if (outcome_ || !evaluator_ || !config_.task) return outcome_;
+  const UnfinishedBatch made = evaluator_->takeUnfinished();
+  const auto succeeded =
+      std::count_if(made.results.begin(), made.results.end(), [](const auto& result) { return result.ok(); });
+  if (succeeded == 0) return std::nullopt;
+  auto outcome = config_.task->unfinishedOutcome(taskContext(), made);
+  if (!outcome) return std::nullopt;
+  const std::string mark =
+      fmt::format("Unfinished run: statistics of {} of {} evaluations", succeeded, config_.plannedEvaluations());
+  outcome->report.insert(outcome->report.begin(), mark);
+  for (DataTable& table : outcome->tables) table.headLines.insert(table.headLines.begin(), mark);
+  for (TaskFile& file : outcome->files) file.content.insert(0, "# " + mark + "\n");
+  state_.log.line("");
+  for (const std::string& line : outcome->report) state_.log.reportLine(line);
   return outcome;
+}
+
+std::vector<std::string> RunDriver::keepStatistics() {
+  std::vector<std::string> report;
+  try {
+    const auto outcome = statisticsOfEarlyEnd();
+    if (!outcome || outcome->report.empty()) return {};
+    report = outcome->report;
+    if (!outcome_) {
+      for (const TaskFile& file : outcome->files) writeBesideResults(file.path, file.content);
+    }
+    results_->writeTables(outcome->tables);
+    if (!outcome_) results_->record().record().analysed = reporter_->evaluationCount() - reporter_->failedCount();
+  } catch (const FatalError& error) {
+    state_.log.warning(fmt::format("The statistics lack a part: {}\n{}", error.message(), error.detail()));
+  } catch (const std::exception& error) {
+    state_.log.warning(std::string("The statistics lack a part: ") + error.what());
+  }
+  return report;
 }
 
 std::vector<std::string> RunDriver::closingLines(const Ending& ending) const {
@@ -390,9 +446,9 @@ void RunDriver::logFailures() {
 }
 
 /// Nothing that goes wrong here may hide why the run ended.
-void RunDriver::closeResultsOfEarlyEnd(const Ending& ending) {
+void RunDriver::closeResultsOfEarlyEnd(const Ending& ending, std::span<const std::string> report) {
   try {
-    const auto unwritten = closeResults(ending);
+    const auto unwritten = closeResults(ending, report);
     if (!unwritten || ending.stage == RunStage::failed) return;  // the first reason counts
     state_.log.line(fmt::format("Error: Unable to write to {}\n{}", unwritten->path, unwritten->reason));
   } catch (const std::exception& error) {
@@ -403,17 +459,19 @@ void RunDriver::closeResultsOfEarlyEnd(const Ending& ending) {
 int RunDriver::endInError(std::string_view message, std::string_view detail) {
   const std::string text(trimTrailing(message));
   std::string explained = text;
+  std::vector<std::string> statistics;
   if (!text.empty()) {
     std::string details(detail);
     if (reporter_ && reporter_->failedCount() > 0) {
-      details += fmt::format("{}failed model runs are described in {}", details.empty() ? "" : "\n",
+      details += fmt::format("{}failed evaluations are described in {}", details.empty() ? "" : "\n",
                              fileNameOf(results_->failedRuns().paths().forPeople));
     }
     if (!details.empty()) explained += "\n" + details;
-    endLogInError(text, details);
     showMessage(explained);
+    statistics = keepStatistics();
+    endLogInError(text, details);
   }
-  closeResultsOfEarlyEnd({RunStage::failed, std::string(message), explained});
+  closeResultsOfEarlyEnd({RunStage::failed, std::string(message), explained}, statistics);
   if (launcher_) launcher_->haltProcesses();  // before the report, which takes time
   reportRun();
   return endEarly(message);
@@ -437,7 +495,12 @@ void RunDriver::endLogInError(std::string_view message, std::string_view details
 
 int RunDriver::endCancelled(std::string_view message) {
   showMessage(message, {}, MessageType::information);
-  closeResultsOfEarlyEnd({RunStage::cancelled, std::string(message), std::string(message)});
+  const std::vector<std::string> statistics = keepStatistics();
+  if (!statistics.empty()) {
+    state_.log.line("");
+    state_.log.line(message);
+  }
+  closeResultsOfEarlyEnd({RunStage::cancelled, std::string(message), std::string(message)}, statistics);
   if (launcher_) launcher_->haltProcesses();
   reportRun();
   return endEarly(message);

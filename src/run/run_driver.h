@@ -61,9 +61,14 @@ class RunDriver final {
   void openSeries();
   /// Runs the task, if there is one, and writes its files.
   TaskOutcome runTask();
+  TaskContext taskContext();
+  /// At an early end: logs and writes the statistics of what succeeded, and returns their lines for the result file.
+  /// Nothing that goes wrong here may hide why the run ended.
+  std::vector<std::string> keepStatistics();
+  std::optional<TaskOutcome> statisticsOfEarlyEnd();
   /// Completes the results and the record of the run; returns what failed, if anything. `report`: what the task found.
   std::optional<Unwritten> closeResults(const Ending& ending, std::span<const std::string> report = {});
-  void closeResultsOfEarlyEnd(const Ending& ending);
+  void closeResultsOfEarlyEnd(const Ending& ending, std::span<const std::string> report);
   void completeRecord(const Ending& ending);
   /// Writes the HTML report, if the setup asks for it and there are results. Failures are warnings.
   void reportRun();
@@ -95,6 +100,7 @@ class RunDriver final {
   std::unique_ptr<ProcessLauncher> launcher_;
   std::unique_ptr<ModelRunner> runner_;
   std::unique_ptr<Evaluator> evaluator_;
+  std::optional<TaskOutcome> outcome_;  ///< of the task, once it has come to its end
 };
 
 }  // namespace mirevo

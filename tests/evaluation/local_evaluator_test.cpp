@@ -149,15 +149,18 @@ TEST_F(LocalEvaluatorTest, SetsThatCannotBeRunAreNotStarted) {
   LocalEvaluator& evaluator = makeEvaluator(launcher, 1, 100);
   const auto results = evaluate(evaluator, {9.5, 5.0, 2.0});
   EXPECT_EQ(launcher.starts, 1);
-  EXPECT_THAT(
-      observer_.events,
-      ElementsAre("Evaluation of parameter set No. 1 completed: FAILED - parameter constraints violated",
-                  "record 1 a=9.5 FAILED", "Evaluation of parameter set No. 2 completed: FAILED - model run error",
-                  "record 2 a=5 FAILED", "Evaluation of parameter set No. 3 initiated",
-                  "Evaluation of parameter set No. 3 completed: OK", "record 3 a=2 OK"));
+  EXPECT_THAT(observer_.events,
+              ElementsAre("Evaluation of parameter set No. 1 completed: FAILED - parameter constraints violated",
+                          "record 1 a=9.5 FAILED",
+                          "Evaluation of parameter set No. 2 completed: FAILED - parameter constraints violated",
+                          "record 2 a=5 FAILED", "Evaluation of parameter set No. 3 initiated",
+                          "Evaluation of parameter set No. 3 completed: OK", "record 3 a=2 OK"));
   EXPECT_EQ(results[0].failure->kind, EvaluationFailure::Kind::constraintsViolated);
   EXPECT_THAT(results[1].failure->reason, HasSubstr("inverse"));
   EXPECT_EQ(failedRuns_->failedCount(), 2);
+  EXPECT_THAT(
+      refusalOf([&] { evaluate(makeEvaluator(launcher, 1, 9), {9.5}); }),
+      HasSubstr("\nfailed evaluations: 1, 1 of them not run as they violate the constraints; at most 0 may fail"));
 }
 
 TEST_F(LocalEvaluatorTest, CancellationHaltsWhatRunsAndStartsNothing) {
@@ -218,6 +221,22 @@ TEST_F(LocalEvaluatorTest, AnotherSetUnderTheSameNumberIsNoReplay) {
               StartsWith("Error: Unable to continue the earlier run\n"
                          "evaluation No. 2 has a = 3 in the earlier results, and 3.0000000000000004 now, "
                          "though the settings are the same."));
+}
+
+/// Earlier versions had exp(ln 5) where the setup gives 5.
+TEST_F(LocalEvaluatorTest, AGivenLogarithmicValueIsThatOfAnEarlierVersionToo) {
+  const double earlier = std::exp(std::log(5.0));
+  ASSERT_NE(earlier, 5.0);
+  SearchSpace space{.names = {"k"},
+                    .initial = {std::log(5.0)},
+                    .lower = {0.0},
+                    .upper = {3.0},
+                    .transformation = {TransformationType::logarithmic}};
+  space.givenValues[{0, std::log(5.0)}] = 5.0;
+  const ObjectiveAggregator aggregator(description_.objectives, method_);
+  EarlierEvaluations evaluations(space, aggregator, {{1, {{earlier}, {}}}, {2, {{std::nextafter(earlier, 0.0)}, {}}}});
+  EXPECT_TRUE(evaluations.take(1, space.initial));
+  EXPECT_THAT(refusalOf([&] { evaluations.take(2, space.initial); }), HasSubstr("has k = 4.99"));
 }
 
 TEST_F(LocalEvaluatorTest, TheFoldersOfTheFirstFailedRunsAreKept) {

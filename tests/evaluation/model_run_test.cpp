@@ -234,6 +234,12 @@ TEST_F(ModelRunTest, CrossSectionFilesHaveTheirResistanceNumbersUpdated) {
   }
 }
 
+TEST_F(ModelRunTest, AMasterKnowsWhatItsWorkersCouldNotWrite) {
+  makeRunner(launcher_, 0);
+  EXPECT_EQ(runner_->findUnrunnable(std::vector{-1e120})->kind, Kind::valueNotWritable);
+  EXPECT_FALSE(runner_->findUnrunnable(std::vector{-1e99}));
+}
+
 TEST_F(ModelRunTest, WhatCannotWorkIsRefusedBeforeAModelRuns) {
   const ModelDescription good = description_;
   const std::string lie = "expected a file in " + good.baseFolder +

@@ -23,11 +23,16 @@ const std::vector<std::string>& earlierFiles() {
                                                  "basin_Optimisation_Failures.dat",
                                                  "basin_Sensitivity_Run.dat",
                                                  "basin_Saved/1/a.csv",
-                                                 "basin_Process1/old",
+                                                 "basin_Process1/mirevo_batch.log",
                                                  "basin._kill_"};
   return names;
 }
 constexpr std::size_t kKeptEarlierFiles = 12;
+
+/// With the marks of all of a run's files, or the program would not touch it.
+std::string earlierContent(const std::string& name) {
+  return fmt::format("earlier {} # Mirevo # Band of # Failed evaluations of \n", name);
+}
 
 std::string excerpt(const std::string& text) {
   return text.size() < 600 ? text : text.substr(0, 300) + " ... " + text.substr(text.size() - 300);
@@ -78,7 +83,7 @@ void FaultyRun::reset() const {
   if (start_) {
     fs::copy(start_->path(), path(), fs::copy_options::recursive | fs::copy_options::copy_symlinks);
   } else {
-    for (const std::string& name : earlierFiles()) folder_.write(name, "earlier " + name + "\n");
+    for (const std::string& name : earlierFiles()) folder_.write(name, earlierContent(name));
   }
 }
 
@@ -254,7 +259,7 @@ std::vector<std::string> FaultyRun::checkEarlierFiles() const {
   std::vector<std::string> problems;
   for (std::size_t i = 0; i < kKeptEarlierFiles; ++i) {
     const std::string& name = earlierFiles()[i];
-    if (!contents.contains("earlier " + name + "\n")) problems.push_back("the earlier run's file is lost: " + name);
+    if (!contents.contains(earlierContent(name))) problems.push_back("the earlier run's file is lost: " + name);
   }
   return problems;
 }

@@ -6,6 +6,7 @@
 #include <gtest/gtest.h>
 
 #include "common/data_table.h"
+#include "common/text.h"
 #include "integration/model_folder.h"
 #include "matchers.h"
 
@@ -72,6 +73,28 @@ TEST(LocalSensitivity, OfALinearModelGivesTheCovarianceOfItsClosedForm) {
               -(1.0 + s / 365.0) / rmse, 1e-4);
   EXPECT_THAT(results, ::testing::ContainsRegex("#.*1\\. a"));
   EXPECT_THAT(folder.read("basin.log"), HasSubstr("\nParameter covariance: 365 observations, 2 parameters, 363 "));
+}
+
+// Interpolated values have all digits, however coarse those that the model prints.
+TEST(LocalSensitivity, KnowsTheRoundingOfValuesBetweenTheObservations) {
+  const ModelFolder folder;
+  std::string observed = "time,observed\n";
+  std::string times;
+  for (int day = 1; day <= 336; ++day) {
+    const std::string date = fmt::format("2001-{:02}-{:02}", (day - 1) / 28 + 1, (day - 1) % 28 + 1);
+    observed += fmt::format("{} 07:00,{}\n", date, day % 7);
+    times += date + "\n";
+  }
+  folder.write("observed.csv", observed);
+  folder.write("model/times.txt", times);
+  folder.write("model/run.sh",
+               "#!/bin/sh\nawk '/^[ab] =/ { sum += $3 } END { print \"time,simulated\"\n"
+               "  while ((getline day <\"times.txt\") > 0) printf \"%s,%.3f\\n\", day, 3 + sum * sin(++n / 7) }' "
+               "parameters.txt >simulated.csv\n",
+               0755);
+  ASSERT_EQ(runProgram({folder.writeSetup({.option = 1})}).exitCode, 0);
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("Parameter b is left out of the covariance matrix: its effect cannot "
+                                                  "be told from that of the parameters before it"));
 }
 
 /// A regression problem with certified results.
@@ -186,6 +209,25 @@ TEST(LocalSensitivity, LeavesOutTheSecondOfTwoParametersThatActAsASumAtAnyStep) 
   }
 }
 
+TEST(LocalSensitivity, ItsWarningsAreCountedAndPassedOnLikeAllOthers) {
+  const ModelFolder folder;
+  const std::string setup = folder.writeSetup({.option = 1});
+  folder.editSetup("Lower_Bound = 0.0", "Lower_Bound = 4.0");  // no room for a central step
+  const ProgramResult run = runProgram({setup});
+  ASSERT_EQ(run.exitCode, 0) << run.error;
+  const auto count = [&](const std::string& file, std::string_view what) {
+    std::size_t found = 0;
+    const std::string text = folder.read(file);
+    for (const std::string_view line : splitLines(text)) found += line.starts_with(what) ? 1 : 0;
+    return found;
+  };
+  const std::size_t warnings = count("basin.log", "Warning: ");
+  EXPECT_GT(warnings, 0U);
+  EXPECT_EQ(count("basin._spi_", "MESSAGWarning: "), warnings);
+  EXPECT_EQ(count("basin_Sensitivity_Run.dat", "warning\t"), warnings);
+  EXPECT_THAT(run.error, HasSubstr(fmt::format("{} warning", warnings)));
+}
+
 TEST(Scenarios, OfALogarithmicParameterRunWithTheValuesGiven) {
   const ModelFolder folder;
   const std::string setup = folder.writeSetup({.option = 0, .scenarios = {"5, 1, 1", "10, 1, 1"}});
@@ -242,6 +284,183 @@ TEST(Uncertainty, SummaryAndBandAreThoseOfTheSample) {
               HasSubstr("\n# Band of flow: 100.0 % of 364 observations lie between the 5 and the 95 % quantile\n"));
   EXPECT_THAT(folder.read("basin.log"), AllOf(HasSubstr("\nBand of flow: 100.0 % of 364"),
                                               HasSubstr("\n400 model evaluations, 3 of them failed\n")));
+}
+
+TEST(Uncertainty, TheLogTellsTheDistributionOfEachParameterAndWarnsOfWhatIsHardlyMeant) {
+  const ModelFolder folder;
+  const std::string setup = folder.writeSetup({.option = 3});
+  folder.editSetup("Lower_Bound = 0.0\n      Upper_Bound = 10.0\n      Transformation_Type = 0",
+                   "Lower_Bound = 4.0\n      Upper_Bound = 6.0\n      Transformation_Type = 1");
+  folder.editSetup("Upper_Bound = 5.0\n      Transformation_Type = 0",
+                   "Upper_Bound = 2.0\n      Transformation_Type = 2");
+  folder.editSetup("Standard_Deviation = 0.1\n    [/PARAMETER_2]",
+                   "Standard_Deviation = 0.75\n    [/PARAMETER_2]\n    [PARAMETER_3]\n    [/PARAMETER_3]");
+  ASSERT_EQ(runProgram({setup}).exitCode, 0);
+  const std::string log = folder.read("basin.log");
+  EXPECT_THAT(log,
+              HasSubstr("\n  PARAMETER_1: a, mean 5, standard deviation 0.5 of the natural logarithm; on the model "
+                        "scale median 148.413, 5 to 95 % from 65.2074 to 337.791\n"
+                        "  PARAMETER_2: b, mean 2, standard deviation 0.75; on the model scale 5 to 95 % from 0 to "
+                        "3\n    an integer: values drawn from 2 to below 3 become 2, so that half of the values are "
+                        "below 2; the mean to give for values around 2 is 2.5\n"));
+  EXPECT_THAT(log, HasSubstr("Warning: Mean_Value of PARAMETER_1 (a) is 5, on the model scale 148.413: outside the "
+                             "bounds 4 to 6; the mean of a logarithmic parameter is that of its natural logarithm, "
+                             "ln(5) = 1.60944\n"));
+  EXPECT_THAT(log, Not(HasSubstr("Mean_Value of PARAMETER_2")));
+  EXPECT_THAT(log, HasSubstr("PARAMETER_3: not read: PARAMETER_n is the distribution of the n-th of the 2 variable "));
+
+  folder.editSetup("Mean_Value = 5.0", "Mean_Value = 1.6");
+  ASSERT_EQ(runProgram({setup}).exitCode, 0);
+  std::size_t ofA = 0;
+  std::size_t ofB = 0;
+  std::size_t ofSets = 0;
+  const std::string results = folder.read("basin.dat");
+  for (const auto& row : readDataTable(results).rows) {
+    const double a = *realCell(row[2]);
+    const double b = *realCell(row[3]);
+    ofA += a < 4.0 || a > 6.0 ? 1 : 0;
+    ofB += b < 0.0 || b > 2.0 ? 1 : 0;
+    ofSets += a < 4.0 || a > 6.0 || b < 0.0 || b > 2.0 ? 1 : 0;
+  }
+  ASSERT_GT(std::min(ofA, ofB), 0U);
+  const std::string line =
+      fmt::format("Sets outside the bounds of a parameter: {} of 40 (a in {}, b in {})\n", ofSets, ofA, ofB);
+  EXPECT_THAT(results, HasSubstr("\n# " + line));
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("\n" + line));
+}
+
+TEST(Uncertainty, ReportsWhatTheModelGotAndALargeTableOfCorrelationsOnce) {
+  const ModelFolder folder;
+  const std::string setup = folder.writeSetup({.option = 3});
+  folder.editSetup("Lower_Bound = 0.0\n      Upper_Bound = 10.0\n      Transformation_Type = 0",
+                   "Lower_Bound = 0.1\n      Upper_Bound = 10.0\n      Transformation_Type = 1");
+  folder.editSetup("Upper_Bound = 5.0\n      Transformation_Type = 0",
+                   "Upper_Bound = 5.0\n      Transformation_Type = 2");
+  folder.editSetup("Mean_Value = 5.0", "Mean_Value = 1.5");
+  folder.editSetup("Standard_Deviation = 0.1", "Standard_Deviation = 0.8");
+  ASSERT_EQ(runProgram({setup}).exitCode, 0);
+  const auto rows = readDataTable(folder.read("basin.dat")).rows;
+  double sumA = 0.0;
+  double sumB = 0.0;
+  double sumAA = 0.0;
+  double sumBB = 0.0;
+  double sumAB = 0.0;
+  for (const auto& row : rows) {
+    const double a = *realCell(row[2]);
+    const double b = *realCell(row[3]);
+    sumA += a;
+    sumB += b;
+    sumAA += a * a;
+    sumBB += b * b;
+    sumAB += a * b;
+  }
+  const std::string quantiles = folder.read("basin_Quantiles.dat");
+  EXPECT_NEAR(cellOf(quantiles, {"parameter", "a"}, "Mean"), sumA / 40.0, 1e-12);
+  EXPECT_NEAR(cellOf(quantiles, {"parameter", "b"}, "Mean"), sumB / 40.0, 1e-12);
+  EXPECT_EQ(cellOf(quantiles, {"parameter", "b"}, "95 %"), 3.0) << "a step of the integer's grid";
+  EXPECT_NEAR(cellOf(folder.read("basin_SampleCorrelation.dat"), {"a"}, "b"),
+              (40.0 * sumAB - sumA * sumB) / std::sqrt((40.0 * sumAA - sumA * sumA) * (40.0 * sumBB - sumB * sumB)),
+              1e-9);
+  const std::string table = "\n#    Sample correlation              a              b\n";
+  EXPECT_THAT(folder.read("basin.dat"), HasSubstr(table));
+
+  std::string parameters;
+  std::string distributions;
+  for (int i = 3; i <= 11; ++i) {
+    parameters += fmt::format(
+        "[PARAMETER_{0}]\n Initial_Value = 1\n Lower_Bound = 0\n Upper_Bound = 2\n Transformation_Type = 0\n "
+        "Parameter_Type = 0\n Parameter_Name = 'p{0}'\n Parameter_IDValue = 0\n[/PARAMETER_{0}]\n",
+        i + 1);
+    distributions += fmt::format("[PARAMETER_{0}]\nMean_Value = 1\nStandard_Deviation = 1\n[/PARAMETER_{0}]\n", i);
+  }
+  folder.editSetup("[MODEL_PARAMETERS]\n    TqSEKdxListItemCount = 3",
+                   "[MODEL_PARAMETERS]\n    TqSEKdxListItemCount = 12\n" + parameters);
+  folder.editSetup("[/UNCERTAINTY_ESTIMATION]", distributions + "[/UNCERTAINTY_ESTIMATION]");
+  const ProgramResult run = runProgram({setup});
+  ASSERT_EQ(run.exitCode, 0) << run.error;
+  const auto correlations = readDataTable(folder.read("basin_SampleCorrelation.dat")).rows;
+  ASSERT_EQ(correlations.size(), 11U);
+  std::pair<double, std::string> largest;
+  for (std::size_t i = 0; i < 11; ++i) {
+    for (std::size_t j = i + 1; j < 11; ++j) {
+      const double value = *realCell(correlations[i][j + 1]);
+      largest = std::max(largest, {std::abs(value), fmt::format("{}, {} ", correlations[i][0], correlations[j][0])});
+    }
+  }
+  for (const char* file : {"basin.dat", "basin.log"}) {
+    const std::string text = folder.read(file);
+    const std::string heading = text.substr(std::min(text.size(), text.find("Sample correlation        Largest\n")));
+    EXPECT_THAT(heading.substr(heading.find('\n') + 1), ::testing::ContainsRegex("^#? *" + largest.second));
+    EXPECT_THAT(heading, HasSubstr("All correlations of the 11 parameters are in basin_SampleCorrelation.dat\n"));
+    EXPECT_THAT(text, Not(HasSubstr(table))) << file;
+  }
+}
+
+/// What an analysis that did not come to its end says it is of.
+void expectMarked(const ModelFolder& folder, const std::string& results, const std::vector<std::string>& tables,
+                  const std::string& ofHowMany) {
+  const std::string mark = "Unfinished run: statistics of " + ofHowMany + " evaluations\n";
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("\n" + mark));
+  EXPECT_THAT(folder.read(results), HasSubstr("\n# " + mark));
+  for (const std::string& table : tables) EXPECT_THAT("\n" + folder.read(table), HasSubstr("\n# " + mark)) << table;
+  if (folder.exists("basin_Report.html")) {  // not in a build without its page
+    EXPECT_THAT(folder.read("basin_Report.html"),
+                HasSubstr("The statistics are those of an unfinished run: of " + ofHowMany + " evaluations."));
+  }
+}
+
+TEST(UnfinishedAnalysis, AnUncertaintyAnalysisHasTheStatisticsOfWhatSucceededUntilItGoesOn) {
+  const ModelFolder folder;
+  folder.useScript("test -e '" + folder / "sound" + "' || set -- --fail-above 5.3");
+  const std::vector<std::string> files = {"basin_Quantiles.dat", "basin_SampleCorrelation.dat", "basin_Band_1.csv"};
+  const std::string setup = folder.writeSetup({.option = 3, .restart = 2});
+  EXPECT_EQ(runProgram({setup}).exitCode, 1);
+  const auto rows = readDataTable(folder.read("basin.dat")).rows;
+  double sum = 0.0;
+  int count = 0;
+  for (const auto& row : rows) {
+    if (row[1] != "OK") continue;
+    sum += *realCell(row[4]);
+    ++count;
+  }
+  ASSERT_EQ(rows.size(), static_cast<std::size_t>(count) + 5) << "a tenth of 40 may fail";
+  expectMarked(folder, "basin.dat", files, fmt::format("{} of 40", count));
+  const std::string quantiles = folder.read(files[0]);
+  EXPECT_EQ(cellOf(quantiles, {"measure", "flow"}, "Count"), count);
+  EXPECT_NEAR(cellOf(quantiles, {"measure", "flow"}, "Mean"), sum / count, 1e-9);
+  EXPECT_EQ(cellOf(quantiles, {"parameter", "a"}, "Count"), rows.size());
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("failed model runs are described in calSimErr.dat\n"));
+  EXPECT_THAT(folder.read("basin_Run.dat"), HasSubstr(fmt::format("\nanalysedEvaluations\t{}\n", count)));
+
+  folder.write("sound", "");
+  const ProgramResult goneOn = runProgram({setup});
+  EXPECT_EQ(goneOn.exitCode, 0) << goneOn.error;
+  EXPECT_EQ(cellOf(folder.read(files[0]), {"measure", "flow"}, "Count"), 36) << "four failures came before a success";
+  for (const std::string& file : files) EXPECT_THAT(folder.read(file), Not(HasSubstr("Unfinished"))) << file;
+  EXPECT_FALSE(folder.exists("basin_Quantiles.1.dat"));
+  EXPECT_FALSE(folder.exists("basin_Band_1.1.csv"));
+}
+
+TEST(UnfinishedAnalysis, ASensitivityAnalysisHasTheDerivativesThatItKnows) {
+  const ModelFolder folder;
+  folder.useScript("grep -q '^b = *1$' parameters.txt || exit 3");  // the fourth of five sets
+  EXPECT_EQ(runProgram({folder.writeSetup({.option = 1})}).exitCode, 1);
+  expectMarked(folder, "basin_Sensitivity.dat", {"basin_Sensitivities.dat", "basin_ParameterLimits.dat"}, "3 of 5");
+  const std::string table = folder.read("basin_Sensitivities.dat");
+  EXPECT_NEAR(cellOf(table, {"a", "measure", "flow"}, "Derivative"), -0.816676, 1e-5);
+  EXPECT_TRUE(std::isnan(cellOf(table, {"b", "measure", "flow"}, "Derivative")));
+}
+
+TEST(UnfinishedAnalysis, OneThatIsCancelledHasStatisticsAndItsLogStillEndsWithTheReason) {
+  const ModelFolder folder;
+  folder.useScript("sleep 0.1");
+  RunningProgram program({folder.writeSetup({.option = 3})});
+  EXPECT_TRUE(folder.reaches("basin.log", "No. 3 completed: OK"));
+  folder.write("basin._kill_", "");
+  EXPECT_EQ(program.wait().exitCode, 1);
+  const auto count = readDataTable(folder.read("basin.dat")).rows.size();
+  expectMarked(folder, "basin.dat", {"basin_Quantiles.dat", "basin_Band_1.csv"}, fmt::format("{} of 40", count));
+  EXPECT_THAT(folder.read("basin.log"), EndsWith("\n\nSimulation cancelled\n"));
 }
 
 }  // namespace

@@ -91,5 +91,29 @@ TEST(CommandLine, AJobWhoseLauncherIsOfAnotherMpiIsRefusedBeforeAnyFileIsTouched
   }
 }
 
+TEST(Results, WhatIsNotOfARunIsNeitherRenamedNorRemoved) {
+  const ModelFolder folder;
+  const std::string setup =
+      folder.writeSetup({.option = 0, .scenarios = {"9, 1, 1", "5, 2, 1"}, .modelArguments = "--fail-above 8"});
+  for (const char* name : {"basin.log", "basin.dat", "basin_Restart.dat", "basin_Run.dat", "basin_Failures.dat",
+                           "basin_Quantiles.dat", "basin_Series.dat", "basin_Report.html", "basin_Saved/notes.txt",
+                           "basin_Process1/notes.txt", "calSimErr.dat"}) {
+    folder.write(name, "time,flow\n");
+    const ProgramResult run = runProgram({setup});
+    EXPECT_EQ(run.exitCode, 1) << name;
+    const std::string taken = std::string(name).substr(0, std::string_view(name).find('/'));
+    EXPECT_THAT(run.error, AllOf(HasSubstr(folder / taken), HasSubstr("It is not from a run of this program")));
+    EXPECT_EQ(folder.read(name), "time,flow\n");
+    std::filesystem::remove_all(folder / taken);
+  }
+  folder.write("basin_Failed7/notes.txt", "the user's");
+  for (const char* cut : {"", "# Small test ba"}) {  // by a full disk
+    folder.write("basin.dat", cut);
+    EXPECT_EQ(runProgram({setup}).exitCode, 1);
+    EXPECT_THAT(folder.read("basin.dat"), HasSubstr("\n1\tFAILED\t"));
+  }
+  EXPECT_EQ(folder.read("basin_Failed7/notes.txt"), "the user's");
+}
+
 }  // namespace
 }  // namespace mirevo::testing

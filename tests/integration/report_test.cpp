@@ -66,7 +66,8 @@ TEST(Report, OfARunThatGoesOnOrWasCutOffSaysSoAndLeavesItsFilesAlone) {
   folder.useScript("test -e first && set -- --sleep-ms 3600000; touch first");
   folder.writeSetup({.option = 0, .scenarios = {"1, 1, 1", "2, 2, 1"}});
   EXPECT_THAT(makeReport(folder).error, HasSubstr("basin.dat: No such file or directory"));
-  folder.write("basin_Report.html", "of an earlier run");
+  const std::string earlier = R"(<meta content="default-src 'none'; script-src">of an earlier run)";
+  folder.write("basin_Report.html", earlier);
   {
     RunningProgram run({folder / "basin.kdx"});
     ASSERT_TRUE(folder.reaches("basin.dat", "\n1\tOK\t"));
@@ -80,13 +81,23 @@ TEST(Report, OfARunThatGoesOnOrWasCutOffSaysSoAndLeavesItsFilesAlone) {
     EXPECT_THAT(folder.read("basin.log"), StartsWith(log));
     EXPECT_FALSE(folder.exists("basin.1.log"));
   }  // killed
-  EXPECT_EQ(folder.read("basin_Report.1.html"), "of an earlier run");
+  EXPECT_EQ(folder.read("basin_Report.1.html"), earlier);
   const std::string results = folder.read("basin.dat");
   folder.write("basin.dat", results + "2\tOK\t0.");
   EXPECT_EQ(makeReport(folder).exitCode, 0);
   EXPECT_THAT(reportData(folder),
               AllOf(HasSubstr(R"("state":"cut off")"), HasSubstr("1 line of the result file is cut off"),
                     HasSubstr(R"("evaluations":1,)")));
+}
+
+TEST(Report, OfASensitivityAnalysisThatGoesOnSaysOfHowManyEvaluationsItsDerivativesAre) {
+  const ModelFolder folder;
+  folder.useScript("test -e second && set -- --sleep-ms 3600000; test -e first && touch second; touch first");
+  RunningProgram run({folder.writeSetup({.option = 1})});
+  ASSERT_TRUE(folder.reaches("basin_Sensitivity.dat", "\n2\tOK\t"));
+  EXPECT_EQ(makeReport(folder).exitCode, 0);
+  EXPECT_THAT(reportData(folder),
+              HasSubstr(R"("notes":["The statistics are those of an unfinished run: of 2 of 5 evaluations."])"));
 }
 
 // Results without the files that this version adds: the report has all that the others hold.

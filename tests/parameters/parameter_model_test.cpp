@@ -156,8 +156,11 @@ TEST(ParameterModel, SaysWhyASetIsNotRun) {
     ASSERT_EQ(result.index(), 1) << detail;
     EXPECT_EQ(std::get<1>(result).kind, kind) << detail;
     EXPECT_EQ(std::get<1>(result).detail, detail);
+    EXPECT_EQ(model.feasibility().violation(std::vector<double>{a, b}), detail);
   }
   EXPECT_EQ(model.MapToModelValues(std::vector<double>{1, 3}).index(), 0);
+  EXPECT_TRUE(model.feasibility().holds(std::vector<double>{1, 3}));
+  EXPECT_FALSE(ParameterModel({variable("a")}, {}).feasibility().isTested()) << "nothing is asked without constraints";
 }
 
 }  // namespace

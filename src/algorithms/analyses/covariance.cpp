@@ -22,23 +22,60 @@ constexpr double kWarnAboveCorrelation = 0.95;
 /// Smallest squared length of a column of length 1 that must remain after projecting out the columns before it.
 /// Differences of a model's output have no more than 6 to 8 digits, so that anything smaller is noise.
 constexpr double kSmallestPivot = 1.0e-12;
-/// What remains of a dependent column is the rounding of both, whose squares scatter by less than this factor.
+/// What remains of a dependent column is the rounding of all columns that it is made of, whose squares scatter by less
+/// than this factor.
 constexpr double kNoiseFactor = 4.0;
+/// Largest share of a column's squared length that may come from single units of the simulated values.
+constexpr double kMostLost = 0.5;
 
 /// W^(1/2) J and W^(1/2) r, without the rows that have no residual.
 struct WeightedModel {
   std::vector<std::vector<double>> columns;
   std::vector<double> residuals;
   std::vector<double> noise;  ///< expected squared length of what is rounding in a column
+  std::vector<double> lost;   ///< share of a column's squared length that is nothing but rounding
   std::size_t withoutDerivative = 0;
   double lagOne = kNaN;
 };
+
+/// The expected square of what is rounding in a weighted derivative, `unit` being the weighted unit over the width. The
+/// difference of two values, each rounded to its unit, has the variance unit^2 / 6, and none where both are written
+/// alike; interpolation can make it a part of a unit.
+double roundingSquare(double derivative, double unit) {
+  const double part = std::min(std::abs(derivative), std::abs(unit));
+  return part * part / 6.0;
+}
+
+/// The share of a column's squared length that comes from differences of a single unit beside rows without any. Where
+/// the effect of a step is a part p of a unit, a part p of the rows differs by a whole one, and the share is 1 - p.
+/// Neighbouring rows that differ alike are an effect, however few they are.
+double lostShare(std::span<const double> column, std::span<const double> units) {
+  constexpr double kSingle = 1.5;  // units: between one and two
+  double lost = 0.0;
+  double all = 0.0;
+  for (std::size_t i = 0; i < units.size(); ++i) {
+    const double square = column[i] * column[i];
+    all += square;
+    if (!(square > 0.0) || std::abs(column[i]) > kSingle * units[i]) continue;
+    double neighbours = 0.0;
+    double alike = 0.0;
+    for (const std::size_t k : {i - 1, i + 1}) {  // of row 0 the former is no row either
+      if (k >= units.size()) continue;
+      neighbours += 1.0;
+      // Interpolation spreads a difference of one time step over the two observations beside it.
+      if (column[i] * column[k] > 0.0) alike += std::min(1.0, std::abs(column[k]) / units[k]);
+    }
+    if (neighbours > 0.0) lost += square * (1.0 - alike / neighbours);
+  }
+  return all > 0.0 ? lost / all : 0.0;
+}
 
 WeightedModel weighRows(const LinearisedModel& model) {
   assert(model.weights.empty() || model.weights.size() == model.residuals.size());
   WeightedModel weighted;
   weighted.columns.resize(model.jacobian.size());
   weighted.noise.resize(model.jacobian.size(), 0.0);
+  std::vector<std::vector<double>> units(model.jacobian.size());  // of the entries of the columns
   std::vector<std::size_t> known;
   for (std::size_t j = 0; j < model.jacobian.size(); ++j) {
     const std::vector<double>& column = model.jacobian[j];
@@ -64,11 +101,11 @@ WeightedModel weighRows(const LinearisedModel& model) {
     for (std::size_t j = 0; j < model.jacobian.size(); ++j) {
       weighted.columns[j].push_back(root * model.jacobian[j][i]);
       if (model.units.empty()) continue;
-      // The difference of two values, each rounded to its unit, has the variance unit^2 / 6.
-      const double rounding = root * model.units[i] / model.widths[j];
-      weighted.noise[j] += rounding * rounding / 6.0;
+      units[j].push_back(std::abs(root * model.units[i] / model.widths[j]));
+      weighted.noise[j] += roundingSquare(weighted.columns[j].back(), units[j].back());
     }
   }
+  for (std::size_t j = 0; j < units.size(); ++j) weighted.lost.push_back(lostShare(weighted.columns[j], units[j]));
   if (squares > 0.0) weighted.lagOne = products / squares;
   return weighted;
 }
@@ -103,19 +140,35 @@ std::vector<double> gramMatrix(const std::vector<std::vector<double>>& columns, 
   return gram;
 }
 
+/// The coefficients of column i on the columns before it, by the triangular factor R of the Gram matrix: R b = R(., i).
+std::vector<double> coefficients(std::span<const double> factor, std::size_t k, std::size_t i) {
+  // DPOTRF fills the upper triangle, in Fortran's column order.
+  std::vector<double> b(factor.begin() + static_cast<std::ptrdiff_t>(i * k),
+                        factor.begin() + static_cast<std::ptrdiff_t>(i * k + i));
+  for (std::size_t row = i; row-- > 0;) {
+    b[row] /= factor[row * k + row];
+    for (std::size_t above = 0; above < row; ++above) b[above] -= factor[row * k + above] * b[row];
+  }
+  return b;
+}
+
 /// Factorises the Gram matrix in place. Returns the 0-based index of the first column that depends on those before it,
-/// or k when there is none. `noise` is the share of rounding in the squared length of each column.
+/// or k when there is none. `noise` is the share of rounding in the squared length of each column; what is left of a
+/// column holds its own and, by its coefficients, that of the others.
 std::size_t factorise(std::vector<double>& gram, std::size_t k, std::span<const double> noise) {
   const int n = static_cast<int>(k);
   int info = 0;
   useOneLapackThread();
   dpotrf_("U", &n, gram.data(), &n, &info);
   const std::size_t sound = info > 0 ? static_cast<std::size_t>(info - 1) : k;
-  double sum = 0.0;
   for (std::size_t i = 0; i < sound; ++i) {
     const double pivot = gram[i * k + i];
-    sum += noise[i];
-    if (!(pivot * pivot > std::max(kSmallestPivot, i == 0 ? 0.0 : kNoiseFactor * sum))) return i;
+    double rounding = i == 0 ? 0.0 : noise[i];  // the first cannot depend on others
+    if (i > 0 && pivot * pivot > kSmallestPivot) {
+      const std::vector<double> b = coefficients(gram, k, i);
+      for (std::size_t j = 0; j < i; ++j) rounding += b[j] * b[j] * noise[j];
+    }
+    if (!(pivot * pivot > std::max(kSmallestPivot, kNoiseFactor * rounding))) return i;
   }
   return sound;
 }
@@ -128,6 +181,8 @@ std::vector<double> invertWhatCanBe(const WeightedModel& weighted, std::span<con
       result.leftOut.push_back({j, "its derivatives are not known"});
     } else if (lengths[j] == 0.0) {
       result.leftOut.push_back({j, "no simulated value depends on it"});
+    } else if (weighted.lost[j] > kMostLost) {
+      result.leftOut.push_back({j, "the effect of its step is lost in the rounding of the model's output"});
     } else {
       result.kept.push_back(j);
     }
@@ -155,14 +210,17 @@ std::vector<double> invertWhatCanBe(const WeightedModel& weighted, std::span<con
   return gram;
 }
 
-/// The factor is that of a mean of residuals that follow one another as in a first-order autoregression.
-std::string lagOneText(double lagOne) {
+/// The factor is that of a mean of residuals that follow one another as in a first-order autoregression. No line for
+/// residuals that are all 0.
+std::vector<std::string> lagOneLines(double lagOne) {
   constexpr double kHardlyAny = 0.1;
-  if (!(lagOne > kHardlyAny) || lagOne >= 1.0) return fmt::format("Lag-1 correlation of the residuals: {:.3f}", lagOne);
-  return fmt::format(
-      "Lag-1 correlation of the residuals: {:.3f}, which makes the standard deviations about {:.1f} times "
-      "too small, and the limits as much too narrow",
-      lagOne, std::sqrt((1.0 + lagOne) / (1.0 - lagOne)));
+  if (!std::isfinite(lagOne)) return {};
+  if (!(lagOne > kHardlyAny) || lagOne >= 1.0)
+    return {fmt::format("Lag-1 correlation of the residuals: {:.3f}", lagOne)};
+  return {
+      fmt::format("Lag-1 correlation of the residuals: {:.3f}, which makes the standard deviations about {:.1f} times "
+                  "too small, and the limits as much too narrow",
+                  lagOne, std::sqrt((1.0 + lagOne) / (1.0 - lagOne)))};
 }
 
 }  // namespace
@@ -237,8 +295,9 @@ std::vector<DataTable> covarianceTables(const ParameterCovariance& covariance, c
       matrixTable(run_files::kCorrelation, "Correlation of the parameters", names, covariance.correlation));
   DataTable& limits = tables.emplace_back();
   limits.file = run_files::kParameterLimits;
-  limits.headLines = {"Estimate, standard deviation and 95 % limits of each parameter, model scale",
-                      lagOneText(covariance.lagOne)};
+  limits.headLines = lagOneLines(covariance.lagOne);
+  limits.headLines.insert(limits.headLines.begin(),
+                          "Estimate, standard deviation and 95 % limits of each parameter, model scale");
   limits.columns = {"Parameter", "Estimate", "StandardDeviation", "Lower95", "Upper95", "LeftOut"};
   const std::vector<ParameterLimits> found = parameterLimits(covariance, space, set);
   for (std::size_t i = 0; i < names.size(); ++i) {
@@ -290,7 +349,7 @@ std::vector<std::string> formatCovariance(const ParameterCovariance& covariance,
         covariance.withoutDerivative));
   }
   lines.push_back(fmt::format("Standard error of a residual: {:.6g}", std::sqrt(covariance.errorVariance)));
-  lines.push_back(lagOneText(covariance.lagOne));
+  for (std::string& line : lagOneLines(covariance.lagOne)) lines.push_back(std::move(line));
 
   std::vector<std::string> names;
   for (const std::size_t j : covariance.kept) names.push_back(space.names[j]);

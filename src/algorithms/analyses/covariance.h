@@ -20,6 +20,8 @@ struct LinearisedModel {
   /// from both follows how much of a column is rounding. None when empty.
   std::vector<double> units = {};
   std::vector<double> widths = {};
+  /// Which derivatives of each column are one-sided for want of a value, p of n; none when empty.
+  std::vector<std::vector<bool>> oneSided = {};
 };
 
 /// A parameter without a variance, and why.
@@ -44,8 +46,8 @@ struct ParameterCovariance {
 };
 
 /// By Cholesky factorisation of the scaled matrix (DPOTRF, DPOTRI). A parameter whose column is zero, has no finite
-/// entry, or is, to within the rounding of the simulated values, a linear combination of the columns before it is left
-/// out, with the reason. A row that lacks a derivative by another parameter is left out.
+/// entry, is mostly rounding of the simulated values, or is, to within this rounding, a linear combination of the
+/// columns before it is left out, with the reason. A row that lacks a derivative by another parameter is left out.
 ParameterCovariance parameterCovariance(const LinearisedModel& model);
 
 /// One parameter on the model scale. The limits are computed on the search scale and transformed back; the standard

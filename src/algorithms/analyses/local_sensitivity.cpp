@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <cassert>
-#include <charconv>
 #include <cmath>
 #include <limits>
 #include <numeric>
@@ -27,6 +26,7 @@ struct Step {
   double roomUp = 0.0;
   double roomDown = 0.0;
   double extent = 0.0;
+  bool isInteger = false;
 };
 
 Step wantedStep(const SensitivitySettings& settings, const SearchSpace& space, std::span<const double> base,
@@ -36,6 +36,7 @@ Step wantedStep(const SensitivitySettings& settings, const SearchSpace& space, s
   const double upper = type == TransformationType::integer ? space.upper[j] - 1.0 : space.upper[j];
   const double fraction = settings.perturbationFraction;
   Step step;
+  step.isInteger = type == TransformationType::integer;
   step.roomUp = std::max(upper - base[j], 0.0);
   step.roomDown = std::max(base[j] - space.lower[j], 0.0);
   if (settings.perturbationOption == PerturbationOption::range) {
@@ -70,9 +71,12 @@ ParameterDifference planDifference(const Step& step, bool central, std::size_t j
   ParameterDifference difference;
   difference.extent = step.extent;
   if (step.up == 0.0 || step.roomUp + step.roomDown == 0.0) {
-    difference.problem = step.roomUp + step.roomDown == 0.0
-                             ? "its bounds are equal"
-                             : "its value is 0, and the perturbation is a fraction of it";
+    if (step.roomUp + step.roomDown == 0.0) {
+      // Those of an integer parameter may be 3 and 3.5.
+      difference.problem = step.isInteger ? "its bounds leave a single value" : "its bounds are equal";
+    } else {
+      difference.problem = "its value is 0, and the perturbation is a fraction of it";
+    }
     return difference;
   }
   const bool fitsUp = step.up <= step.roomUp;
@@ -185,11 +189,57 @@ void noteFailures(PerturbationPlan& plan, std::span<const EvaluationResult> resu
   }
 }
 
-/// The difference quotient of an output, by the base value where one side of a central difference has none.
+/// Whether just one side of a central difference has no value.
+bool lacksOneSide(const ParameterDifference& difference, double below, double above) {
+  return difference.isCentral() && std::isnan(below) != std::isnan(above);
+}
+
+/// The difference quotient of an output, by the base value where one side of a central difference has none; NaN if the
+/// parameter's values of both are written alike.
 double quotient(const ParameterDifference& difference, double below, double base, double above) {
-  const double central = (above - below) / difference.width;
-  if (!difference.isCentral() || !std::isnan(central)) return central;
-  return std::isnan(below) ? (above - base) / difference.widthAbove : (base - below) / difference.widthBelow;
+  if (!lacksOneSide(difference, below, above)) return (above - below) / difference.width;
+  const double width = std::isnan(below) ? difference.widthAbove : difference.widthBelow;
+  if (!(std::abs(width) > 0.0)) return kNaN;
+  return (std::isnan(below) ? above - base : base - below) / width;
+}
+
+/// Whether a run has no value for an observation that the base run has one for: their measures do not compare.
+bool comparesFewerValues(const EvaluationResult& result, const EvaluationResult& base) {
+  for (const UnusedObservations& unused : result.unusedObservations) {
+    const auto ofBase = std::find_if(base.unusedObservations.begin(), base.unusedObservations.end(),
+                                     [&](const UnusedObservations& other) { return other.measure == unused.measure; });
+    if (ofBase == base.unusedObservations.end() || unused.usedCount < ofBase->usedCount) return true;
+  }
+  // After a restart, where a task keeps the values.
+  for (std::size_t i = 0; i < std::min(result.simulatedValues.size(), base.simulatedValues.size()); ++i) {
+    if (std::isnan(result.simulatedValues[i]) && !std::isnan(base.simulatedValues[i])) return true;
+  }
+  return false;
+}
+
+/// The warning of perturbed runs that fit better than the base set; empty where there is none.
+std::string betterFitText(std::span<const EvaluationResult> results) {
+  constexpr double kRounding = 1.0 - 1.0e-6;  // of the statistics, in 32 bits
+  const EvaluationResult& base = results.front();
+  const EvaluationResult* best = nullptr;
+  std::size_t count = 0;
+  for (const EvaluationResult& result : results) {
+    // A negative aggregate is no measure of a misfit.
+    if (!base.ok() || !result.ok() || !(result.aggregate >= 0.0 && result.aggregate < base.aggregate * kRounding) ||
+        comparesFewerValues(result, base)) {
+      continue;
+    }
+    ++count;
+    if (best == nullptr || result.aggregate < best->aggregate) best = &result;
+  }
+  if (best == nullptr) return {};
+  const std::string which =
+      count == 1
+          ? fmt::format("evaluation {} fits better than the base set: its", best->number)
+          : fmt::format("{} evaluations fit better than the base set, evaluation {} best: its", count, best->number);
+  return fmt::format(
+      "Warning: {} aggregate is {}, not {}; the base set is not the best, and its derivatives and deviations mislead",
+      which, formatReal(best->aggregate), formatReal(base.aggregate));
 }
 
 void appendTable(std::vector<std::string>& lines, const std::string& title, std::span<const std::string> outputs,
@@ -257,7 +307,7 @@ std::vector<int> ofVariableParameters(std::span<const int> fieldWidths, std::spa
 bool hasRoomForStep(const SensitivitySettings& settings, const SearchSpace& space, std::size_t j) {
   constexpr double kRounding = 1.0 + 1.0e-12;
   const Step step = wantedStep(settings, space, space.initial, j);
-  // Equal bounds leave no parameter to perturb; it is left out by name.
+  // Bounds that leave a single value leave no parameter to perturb; it is left out by name.
   if (step.roomUp + step.roomDown == 0.0) return true;
   return step.up <= step.roomUp * kRounding || step.down <= step.roomDown * kRounding;
 }
@@ -296,40 +346,6 @@ std::vector<std::vector<double>> differenceColumns(const PerturbationPlan& plan,
   return columns;
 }
 
-std::vector<double> printedUnits(std::span<const double> values, std::span<const std::vector<double>> others) {
-  constexpr int kSingleDigits = 9;
-  int mostDigits = 0;
-  int lowestPlace = std::numeric_limits<int>::max();
-  bool isSingle = true;
-  const auto take = [&](double value) {
-    if (!std::isfinite(value) || value == 0.0) return;
-    char text[32];
-    const std::string_view shortest(
-        text, std::to_chars(std::begin(text), std::end(text), std::abs(value), std::chars_format::scientific).ptr);
-    const std::size_t mark = shortest.find('e');
-    const int digits = static_cast<int>(mark) - (mark > 1 ? 1 : 0);
-    const int exponent = static_cast<int>(std::floor(std::log10(std::abs(value))));
-    mostDigits = std::max(mostDigits, digits);
-    lowestPlace = std::min(lowestPlace, exponent - digits + 1);
-    isSingle = isSingle && static_cast<double>(static_cast<float>(value)) == value;
-  };
-  std::for_each(values.begin(), values.end(), take);
-  for (const std::vector<double>& more : others) std::for_each(more.begin(), more.end(), take);
-  std::vector<double> units;
-  for (const double value : values) {
-    const double size = std::abs(value);
-    if (mostDigits == 0 || !std::isfinite(value)) {
-      units.push_back(0.0);
-    } else if (isSingle && mostDigits > kSingleDigits) {
-      units.push_back(size * static_cast<double>(std::numeric_limits<float>::epsilon()));
-    } else {
-      const double ofDigits = size > 0.0 ? std::pow(10.0, std::floor(std::log10(size)) - mostDigits + 1) : 0.0;
-      units.push_back(std::max(std::pow(10.0, lowestPlace), ofDigits));
-    }
-  }
-  return units;
-}
-
 std::vector<std::size_t> ranked(std::span<const double> values) {
   std::vector<std::size_t> order(values.size());
   std::iota(order.begin(), order.end(), std::size_t{0});
@@ -346,11 +362,22 @@ void takeObservations(const LinearisedModel& model, LocalSensitivity& sensitivit
     const double extent = sensitivity.plan.differences[j].extent;
     double squares = 0.0;
     std::size_t count = 0;
+    std::size_t oneSided = 0;
+    std::size_t observations = 0;
     for (std::size_t i = 0; i < model.residuals.size(); ++i) {
       const double change = model.jacobian[j][i] * extent;
-      if (!std::isfinite(model.residuals[i]) || !std::isfinite(change)) continue;
+      if (!std::isfinite(model.residuals[i])) continue;
+      ++observations;
+      if (!std::isfinite(change)) continue;
+      if (!model.oneSided.empty() && model.oneSided[j][i]) ++oneSided;
       squares += (model.weights.empty() ? 1.0 : model.weights[i]) * change * change;
       ++count;
+    }
+    if (oneSided > 0) {
+      sensitivity.plan.differences[j].warnings.push_back(fmt::format(
+          "one of its two runs has no value at {} of {} observations: the differences there are those of the other "
+          "run and the base run",
+          oneSided, observations));
     }
     sensitivity.ofObservations.push_back(count == 0 ? kNaN : std::sqrt(squares / static_cast<double>(count)));
   }
@@ -366,7 +393,14 @@ std::optional<LinearisedModel> linearise(const PerturbationPlan& plan,
   for (std::size_t i = 0; i < base.size(); ++i) model.residuals.push_back(base[i] - observedValues[i]);
   model.weights = std::move(weights);
   model.jacobian = differenceColumns(plan, simulatedValues);
-  for (const ParameterDifference& difference : plan.differences) model.widths.push_back(difference.width);
+  for (const ParameterDifference& difference : plan.differences) {
+    model.widths.push_back(difference.width);
+    const std::vector<double>& minus = simulatedValues[difference.minus];
+    const std::vector<double>& plus = simulatedValues[difference.plus];
+    std::vector<bool>& oneSided = model.oneSided.emplace_back(base.size());
+    if (minus.size() != base.size() || plus.size() != base.size()) continue;
+    for (std::size_t i = 0; i < base.size(); ++i) oneSided[i] = lacksOneSide(difference, minus[i], plus[i]);
+  }
   return model;
 }
 
@@ -412,18 +446,7 @@ std::vector<std::string> formatSensitivity(const LocalSensitivity& sensitivity, 
     appendTable(lines, "Derivatives of " + what, outputs, names.parameters, table.derivatives);
     appendTable(lines, "Scaled sensitivities of " + what, outputs, names.parameters, table.scaled);
   };
-  for (const EvaluationResult& result : sensitivity.results) {
-    constexpr double kRounding = 1.0 - 1.0e-6;  // of the statistics, in 32 bits
-    const EvaluationResult& base = sensitivity.results.front();
-    // A negative aggregate is no measure of a misfit.
-    if (!base.ok() || !result.ok() || !(result.aggregate >= 0.0 && result.aggregate < base.aggregate * kRounding)) {
-      continue;
-    }
-    lines.push_back(
-        fmt::format("Warning: evaluation {} fits better than the base set: its aggregate is {}, not {}; the "
-                    "base set is not the best, and its derivatives and deviations mislead",
-                    result.number, formatReal(result.aggregate), formatReal(base.aggregate)));
-  }
+  if (std::string text = betterFitText(sensitivity.results); !text.empty()) lines.push_back(std::move(text));
   appendBoth("output measures", sensitivity.measures, names.measures);
   appendBoth("objective functions", sensitivity.objectives, names.objectives);
 

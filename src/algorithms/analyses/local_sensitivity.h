@@ -97,13 +97,9 @@ LocalSensitivity localSensitivity(const SensitivitySettings& settings, const Sea
 
 /// The derivatives of any outputs by differences: p columns, one row per value; NaN for a parameter with a problem.
 /// `outputs[i]` are the values of set i; those of a failed set may be empty. A value that one side of a central
-/// difference lacks is replaced by that of the base set.
+/// difference lacks is replaced by that of the base set, unless the parameter's values of both are written alike.
 std::vector<std::vector<double>> differenceColumns(const PerturbationPlan& plan,
                                                    std::span<const std::vector<double>> outputs);
-
-/// The unit in which each of these values is printed in its file: that of the last digit that any of them has, or of
-/// the last of the most significant digits, whichever is larger.
-std::vector<double> printedUnits(std::span<const double> values, std::span<const std::vector<double>> others);
 
 /// The linearised model for the covariance matrix, from the simulated values of every set at the observation times
 /// (empty for a failed one); nothing when the base set failed.
@@ -113,7 +109,8 @@ std::optional<LinearisedModel> linearise(const PerturbationPlan& plan,
 
 /// Computes the composite scaled sensitivities over the observations and ranks by them: the root mean square of the
 /// derivatives of all simulated values times the extent of the parameter and the root of the weight (Hill and
-/// Tiedeman). Unlike the derivatives of a measure of the error, they do not vanish at an optimum.
+/// Tiedeman). Unlike the derivatives of a measure of the error, they do not vanish at an optimum. The plan says how
+/// many derivatives are one-sided for want of a value.
 void takeObservations(const LinearisedModel& model, LocalSensitivity& sensitivity);
 
 /// The analysis as tables for programs: one row per parameter and output with the derivative, the scaled sensitivity,

@@ -8,11 +8,14 @@
 #include <fmt/core.h>
 
 #include "algorithms/numbers/uniform_generator.h"
+#include "common/fatal_error.h"
 #include "common/run_files.h"
 
 namespace mirevo {
 
 namespace {
+
+constexpr int kMostRedraws = 1'000'000;  // of one set
 
 /// Replaces deviate i by a random value in the stratum (pi_i - 1, pi_i) / N, where pi_i is its rank among the deviates,
 /// from 1; ties by index.
@@ -75,7 +78,13 @@ const SettingSection<UncertaintySection>& uncertaintySection() {
                                      .meaning = "Parameter sets that are drawn."}),
         setting<UncertaintySection>(
             [](auto& s) -> auto& { return s.randomSeed; },
-            {.name = "Random_Seed", .defaultValue = "1", .meaning = "Seed of the run; its sign does not matter."})}}};
+            {.name = "Random_Seed", .defaultValue = "1", .meaning = "Seed of the run; its sign does not matter."}),
+        setting<UncertaintySection>(
+            [](auto& s) -> auto& { return s.settings.redrawsInfeasible; },
+            {.name = "Redraw_Infeasible",
+             .defaultValue = "0",
+             .meaning = "1: sets that violate a constraint are drawn again until all sets can be run. 0: they are not "
+                        "run and count as failed."})}}};
   return section;
 }
 
@@ -84,9 +93,11 @@ const SettingSection<NormalDistribution>& distributionSection() {
       {"UNCERTAINTY_ESTIMATION/PARAMETER_n",
        "for each variable parameter",
        "The normal distribution of the n-th *variable* parameter, counted in the order of `MODEL_PARAMETERS`.",
-       {setting<&NormalDistribution::mean>({.name = "Mean_Value",
-                                            .unit = "search scale",
-                                            .meaning = "Mean; that of the logarithm for a logarithmic parameter."}),
+       {setting<&NormalDistribution::mean>(
+            {.name = "Mean_Value",
+             .unit = "search scale",
+             .meaning = "Mean; that of the logarithm for a logarithmic parameter, half a step above "
+                        "the value meant for an integer parameter."}),
         setting<&NormalDistribution::standardDeviation>(
             {.name = "Standard_Deviation",
              .range = kPositive,
@@ -96,9 +107,10 @@ const SettingSection<NormalDistribution>& distributionSection() {
   return section;
 }
 
-std::vector<ParameterSet> uncertaintySample(const UncertaintySettings& settings, std::int32_t seed,
-                                            const MessageSink& messages) {
-  UniformGenerator random(seed);
+namespace {
+
+std::vector<ParameterSet> drawSample(const UncertaintySettings& settings, UniformGenerator& random,
+                                     const MessageSink& messages) {
   const auto n = static_cast<std::size_t>(std::max(settings.sampleSize, 0));
   std::vector<ParameterSet> sample(n, ParameterSet(settings.parameters.size()));
   std::vector<double> deviates(n);
@@ -115,15 +127,46 @@ std::vector<ParameterSet> uncertaintySample(const UncertaintySettings& settings,
   return sample;
 }
 
-UncertaintyOutcome uncertaintyAnalysis(const UncertaintySettings& settings, std::int32_t seed, Evaluator& evaluator,
-                                       const MessageSink& messages) {
-  UncertaintyOutcome outcome;
-  if (!settings.parameters.empty()) outcome.sample = uncertaintySample(settings, seed, messages);
+}  // namespace
+
+std::vector<ParameterSet> uncertaintySample(const UncertaintySettings& settings, std::int32_t seed,
+                                            const MessageSink& messages) {
+  UniformGenerator random(seed);
+  return drawSample(settings, random, messages);
+}
+
+FeasibleSample feasibleUncertaintySample(const UncertaintySettings& settings, std::int32_t seed,
+                                         const Feasibility& feasibility, const MessageSink& messages) {
+  UniformGenerator random(seed);
+  FeasibleSample sample{drawSample(settings, random, messages)};
+  sample.drawnCount = static_cast<std::int64_t>(sample.sets.size());
+  UncertaintySettings single = settings;
+  single.samplingType = SamplingType::simpleRandom;
+  single.sampleSize = 1;
+  for (ParameterSet& set : sample.sets) {
+    std::optional<std::string> violation = feasibility.violation(set);
+    for (int redraws = 0; violation; ++redraws) {
+      if (redraws == kMostRedraws) {
+        fatalError("Error: No parameter set found that satisfies the constraints",
+                   fmt::format("none of {} drawn one after the other; the last one: {}", redraws, *violation));
+      }
+      set = std::move(drawSample(single, random, messages).front());
+      ++sample.drawnCount;
+      violation = feasibility.violation(set);
+    }
+  }
+  return sample;
+}
+
+UncertaintyOutcome uncertaintyAnalysis(std::vector<ParameterSet> sample, Evaluator& evaluator) {
+  UncertaintyOutcome outcome{std::move(sample), {}};
   outcome.results = evaluator.evaluateParameterSets(outcome.sample, DispatchMode::task);
   return outcome;
 }
 
-UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome) {
+UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome, const SearchSpace& space) {
+  std::vector<std::vector<double>> modelValues;
+  for (const ParameterSet& set : outcome.sample) modelValues.push_back(ToModelScale(space, set));
   std::vector<const EvaluationResult*> successful;
   for (const EvaluationResult& result : outcome.results) {
     if (result.ok()) successful.push_back(&result);
@@ -132,8 +175,8 @@ UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome) {
   summary.evaluationCount = outcome.results.size();
   summary.failedCount = outcome.results.size() - successful.size();
   summary.parameters = summariseColumns(
-      outcome.sample.size(), [&](std::size_t i) -> auto& { return outcome.sample[i]; });
-  summary.correlations = correlationMatrix(outcome.sample);
+      modelValues.size(), [&](std::size_t i) -> auto& { return modelValues[i]; });
+  summary.correlations = correlationMatrix(modelValues);
   summary.measures = summariseColumns(
       successful.size(), [&](std::size_t i) -> auto& { return successful[i]->measureValues; });
   summary.objectives = summariseColumns(
@@ -145,7 +188,7 @@ std::vector<DataTable> uncertaintyTables(const UncertaintySummary& summary, cons
   DataTable table;
   table.file = run_files::kQuantiles;
   table.headLines = {
-      "Parameters on the search scale, of all sets drawn; measures and objective functions of those whose "
+      "Parameters on the model scale, of all sets evaluated; measures and objective functions of those whose "
       "model run succeeded"};
   table.columns = {"Kind", "Name", "Count", "Mean", "StandardDeviation"};
   for (const double p : kSummaryProbabilities) table.columns.push_back(fmt::format("{:g} %", 100.0 * p));
@@ -162,20 +205,21 @@ std::vector<DataTable> uncertaintyTables(const UncertaintySummary& summary, cons
   add("measure", names.measures, summary.measures);
   add("objective", names.objectives, summary.objectives);
   return {std::move(table),
-          matrixTable(run_files::kSampleCorrelation, "Correlation of the parameters of all sets drawn",
+          matrixTable(run_files::kSampleCorrelation, "Correlation of the parameters of all sets evaluated, model scale",
                       names.parameters, summary.correlations)};
 }
 
-std::vector<std::string> formatUncertainty(const UncertaintySummary& summary, const AnalysisNames& names) {
+std::vector<std::string> formatUncertainty(const UncertaintySummary& summary, const AnalysisNames& names,
+                                           std::string_view correlationFile) {
   std::vector<std::string> lines;
   lines.push_back(fmt::format("Uncertainty analysis: {} evaluations, {} failed and left out of the statistics",
                               summary.evaluationCount, summary.failedCount));
-  appendSummaries(lines, "Parameter (search scale)", names.parameters, summary.parameters);
+  appendSummaries(lines, "Parameter (model scale)", names.parameters, summary.parameters);
   appendSummaries(lines, "Output measure", names.measures, summary.measures);
   appendSummaries(lines, "Objective function", names.objectives, summary.objectives);
   lines.emplace_back();
   for (std::string& line :
-       formatTable("Sample correlation", names.parameters, names.parameters, summary.correlations)) {
+       formatCorrelation("Sample correlation", names.parameters, summary.correlations, correlationFile)) {
     lines.push_back(std::move(line));
   }
   return lines;

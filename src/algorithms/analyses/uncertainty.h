@@ -1,7 +1,10 @@
 #pragma once
 
 #include <cstdint>
+#include <functional>
+#include <span>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "algorithms/numbers/sample_summary.h"
@@ -10,6 +13,8 @@
 #include "common/parameter_set.h"
 #include "common/settings/keyword_row.h"
 #include "evaluation/evaluator.h"
+#include "parameters/feasibility.h"
+#include "parameters/search_space.h"
 
 namespace mirevo {
 
@@ -26,6 +31,7 @@ struct UncertaintySettings {
   SamplingType samplingType = SamplingType::simpleRandom;
   std::int32_t sampleSize = 0;                 ///< N, at least 2
   std::vector<NormalDistribution> parameters;  ///< one per variable parameter, in setup order
+  bool redrawsInfeasible = false;              ///< whether sets that cannot be run are drawn again
 };
 
 /// The section UNCERTAINTY_ESTIMATION, and the seed of the run, which the initial sample sets, too.
@@ -42,17 +48,27 @@ const SettingSection<NormalDistribution>& distributionSection();
 std::vector<ParameterSet> uncertaintySample(const UncertaintySettings& settings, std::int32_t seed,
                                             const MessageSink& messages = {});
 
+/// A sample of sets that can be run.
+struct FeasibleSample {
+  std::vector<ParameterSet> sets;
+  std::int64_t drawnCount = 0;  ///< sets that were drawn for it
+};
+
+/// The uncertaintySample() whose sets that cannot be run are replaced by further ones: the stream goes on behind the
+/// sample, with one deviate for each parameter in setup order, whatever the type of sampling. Throws FatalError "Error:
+/// No parameter set found that satisfies the constraints" if none of a million drawn for one of them can be run.
+FeasibleSample feasibleUncertaintySample(const UncertaintySettings& settings, std::int32_t seed,
+                                         const Feasibility& feasibility, const MessageSink& messages = {});
+
 /// The sets of an uncertainty analysis and their results, in the same order.
 struct UncertaintyOutcome {
   std::vector<ParameterSet> sample;
   std::vector<EvaluationResult> results;
 };
 
-/// Draws the sample and evaluates it in one batch (an empty one where there is no variable parameter). The scale of the
-/// objective functions is not taken from the sample: no aggregate is used here, and a constant objective function must
-/// not end the analysis.
-UncertaintyOutcome uncertaintyAnalysis(const UncertaintySettings& settings, std::int32_t seed, Evaluator& evaluator,
-                                       const MessageSink& messages = {});
+/// Evaluates the sample in one batch. The scale of the objective functions is not taken from it: no aggregate is used
+/// here, and a constant objective function must not end the analysis.
+UncertaintyOutcome uncertaintyAnalysis(std::vector<ParameterSet> sample, Evaluator& evaluator);
 
 /// Names of what an analysis reports, for its tables; each list in setup order.
 struct AnalysisNames {
@@ -64,19 +80,20 @@ struct AnalysisNames {
 struct UncertaintySummary {
   std::size_t evaluationCount = 0;
   std::size_t failedCount = 0;                    ///< left out of the statistics of measures and objective functions
-  std::vector<SampleSummary> parameters;          ///< of all sets drawn, search scale
-  std::vector<std::vector<double>> correlations;  ///< of the parameters of all sets drawn
+  std::vector<SampleSummary> parameters;          ///< of all sets evaluated, as the model gets them
+  std::vector<std::vector<double>> correlations;  ///< of the same values
   std::vector<SampleSummary> measures;
   std::vector<SampleSummary> objectives;
 };
 
-UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome);
+UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome, const SearchSpace& space);
 
-/// The summary as tables for programs: mean, standard deviation and quantiles of each parameter (search scale), measure
+/// The summary as tables for programs: mean, standard deviation and quantiles of each parameter (model scale), measure
 /// and objective function; the correlation of the sampled parameters.
 std::vector<DataTable> uncertaintyTables(const UncertaintySummary& summary, const AnalysisNames& names);
 
-/// The summary as lines of text for the log.
-std::vector<std::string> formatUncertainty(const UncertaintySummary& summary, const AnalysisNames& names);
+/// The summary as lines of text for the log. `correlationFile` is the name of the file with the table of correlations.
+std::vector<std::string> formatUncertainty(const UncertaintySummary& summary, const AnalysisNames& names,
+                                           std::string_view correlationFile);
 
 }  // namespace mirevo

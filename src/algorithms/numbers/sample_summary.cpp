@@ -119,4 +119,31 @@ std::vector<std::string> formatTable(const std::string& corner, std::span<const 
   return lines;
 }
 
+std::vector<std::string> formatCorrelation(const std::string& title, std::span<const std::string> names,
+                                           std::span<const std::vector<double>> matrix, std::string_view file) {
+  constexpr std::size_t kMostInTable = 10;
+  constexpr std::size_t kLargestShown = 10;
+  if (matrix.size() <= kMostInTable) return formatTable(title, names, names, matrix);
+  std::vector<std::pair<std::size_t, std::size_t>> entries;
+  for (std::size_t i = 0; i < matrix.size(); ++i) {
+    for (std::size_t j = i + 1; j < matrix.size(); ++j) {
+      if (!std::isnan(matrix[i][j])) entries.emplace_back(i, j);
+    }
+  }
+  std::stable_sort(entries.begin(), entries.end(), [matrix](const auto& a, const auto& b) {
+    return std::abs(matrix[a.first][a.second]) > std::abs(matrix[b.first][b.second]);
+  });
+  if (entries.size() > kLargestShown) entries.resize(kLargestShown);
+  std::vector<std::string> pairs;
+  std::vector<std::vector<double>> values;
+  for (const auto& [i, j] : entries) {
+    pairs.push_back(fmt::format("{}, {}", names[i], names[j]));
+    values.push_back({matrix[i][j]});
+  }
+  const std::string headings[] = {"Largest"};
+  std::vector<std::string> lines = formatTable(title, headings, pairs, values);
+  lines.push_back(fmt::format("   All correlations of the {} parameters are in {}", names.size(), file));
+  return lines;
+}
+
 }  // namespace mirevo

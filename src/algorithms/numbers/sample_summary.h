@@ -3,6 +3,7 @@
 #include <array>
 #include <span>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "common/data_table.h"
@@ -42,5 +43,10 @@ DataTable matrixTable(const RunFile& file, std::string headLine, std::span<const
 /// `rows[i]` follows `names[i]`.
 std::vector<std::string> formatTable(const std::string& corner, std::span<const std::string> headings,
                                      std::span<const std::string> names, std::span<const std::vector<double>> rows);
+
+/// A correlation matrix as lines of text: the table of up to 10 parameters; of more the 10 entries with the largest
+/// absolute values alone, as a large table is written once, to `file`.
+std::vector<std::string> formatCorrelation(const std::string& title, std::span<const std::string> names,
+                                           std::span<const std::vector<double>> matrix, std::string_view file);
 
 }  // namespace mirevo

@@ -14,6 +14,9 @@ namespace {
 constexpr float kStartPointShare = 0.005F;
 constexpr int kFewestStartPoints = 5;
 
+/// Perturbations of the same parameters that are drawn, while none can be run, before other parameters are chosen.
+constexpr int kDrawsPerChoice = 10;
+
 bool isUsable(const SearchBounds& bounds) {
   if (bounds.lower.empty() || bounds.upper.size() != bounds.size()) return false;
   for (std::size_t j = 0; j < bounds.size(); ++j) {
@@ -31,22 +34,38 @@ bool isNotGreater(double a, double b) {
   return !std::isnan(a) && (std::isnan(b) || a <= b);
 }
 
+/// The parameters that a candidate perturbs: each of n with the given probability, and at least one.
+std::vector<std::size_t> chooseParameters(std::size_t n, double probability, const DeviateSource& deviate) {
+  std::vector<std::size_t> chosen;
+  for (std::size_t j = 0; j < n; ++j) {
+    if (deviate() < probability) chosen.push_back(j);
+  }
+  if (chosen.empty()) {
+    // ceil(U n) counts from 1; a deviate of 0 also selects the first parameter.
+    const double position = std::ceil(deviate() * static_cast<double>(n));
+    chosen.push_back(std::min(static_cast<std::size_t>(std::max(position, 1.0)), n) - 1);
+  }
+  return chosen;
+}
+
 }  // namespace
 
 Dds::Dds(DdsSettings settings, int maxEvaluations, bool startFromInitial, SearchBounds bounds, Evaluator& evaluator,
-         UniformGenerator& random)
+         UniformGenerator& random, Feasibility feasibility)
     : settings_(settings),
       maxEvaluations_(maxEvaluations),
       startFromInitial_(startFromInitial),
       bounds_(std::move(bounds)),
       evaluator_(evaluator),
-      random_(random) {}
+      random_(random),
+      feasible_(std::move(feasibility)) {}
 
 SearchStatus Dds::initialise() {
   if (maxEvaluations_ < 1 || !isUsable(bounds_)) return kDdsInvalidInput;
   if (startFromInitial_ && bounds_.initial.size() != bounds_.size()) return kDdsInvalidInput;
   summary_ = {};
-  const std::vector<ParameterSet> points = startPoints();
+  std::vector<ParameterSet> points = startPoints();
+  feasible_.replaceInSample(points, startFromInitial_ ? 1 : 0, bounds_, random_);
   std::vector<EvaluationResult> results = evaluator_.evaluateParameterSets(points, DispatchMode::task);
   evaluator_.settleAggregates(results);
   summary_.evaluationCount = static_cast<int>(points.size());
@@ -63,8 +82,8 @@ SearchStatus Dds::advance() {
   if (isTerminated()) return kSearchOk;
   if (summary_.evaluationCount == 0) return kDdsInvalidInput;
   const double probability = ddsInclusionProbability(summary_.evaluationCount + 1, maxEvaluations_);
-  const ParameterSet candidate =
-      ddsCandidate(summary_.best, bounds_, settings_.perturbation, probability, [this] { return random_.next(); });
+  const ParameterSet candidate = ddsCandidate(
+      summary_.best, bounds_, settings_.perturbation, probability, [this] { return random_.next(); }, feasible_);
   std::vector<EvaluationResult> results = evaluator_.evaluateParameterSets({&candidate, 1}, DispatchMode::task);
   ++summary_.evaluationCount;
   ++summary_.loopCount;
@@ -92,6 +111,7 @@ void Dds::takeAsBest(const ParameterSet& set, EvaluationResult& result) {
 }
 
 void Dds::checkBudget() {
+  summary_.replacedCount = feasible_.replacedCount();
   if (summary_.evaluationCount >= maxEvaluations_) {
     summary_.terminationMessage = "Optimisation terminated: Maximum number of model evaluations reached";
   }
@@ -135,24 +155,20 @@ double ddsReflect(double value, double lower, double upper) {
 }
 
 ParameterSet ddsCandidate(std::span<const double> best, const SearchBounds& bounds, double r,
-                          double inclusionProbability, const DeviateSource& deviate) {
-  const std::size_t n = best.size();
+                          double inclusionProbability, const DeviateSource& deviate, FeasiblePoints& feasible) {
   std::vector<std::size_t> chosen;
-  for (std::size_t j = 0; j < n; ++j) {
-    if (deviate() < inclusionProbability) chosen.push_back(j);
-  }
-  if (chosen.empty()) {
-    // ceil(U n) counts from 1; a deviate of 0 also selects the first parameter.
-    const double position = std::ceil(deviate() * static_cast<double>(n));
-    chosen.push_back(std::min(static_cast<std::size_t>(std::max(position, 1.0)), n) - 1);
-  }
-  ParameterSet candidate(best.begin(), best.end());
-  for (const std::size_t j : chosen) {
-    const double range = bounds.upper[j] - bounds.lower[j];
-    const double perturbed = best[j] + r * range * ddsNormalDeviate(deviate);
-    candidate[j] = ddsReflect(perturbed, bounds.lower[j], bounds.upper[j]);
-  }
-  return candidate;
+  int draws = 0;
+  const auto draw = [&] {
+    if (draws++ % kDrawsPerChoice == 0) chosen = chooseParameters(best.size(), inclusionProbability, deviate);
+    ParameterSet candidate(best.begin(), best.end());
+    for (const std::size_t j : chosen) {
+      const double range = bounds.upper[j] - bounds.lower[j];
+      const double perturbed = best[j] + r * range * ddsNormalDeviate(deviate);
+      candidate[j] = ddsReflect(perturbed, bounds.lower[j], bounds.upper[j]);
+    }
+    return candidate;
+  };
+  return feasible.draw(draw, best);
 }
 
 const SearchFacts& DdsMethod::facts() const {
@@ -201,7 +217,7 @@ std::unique_ptr<SearchAlgorithm> DdsMethod::make(SearchProblem problem) const {
   const int made = continues ? problem.earlierSearches.back().lastEvaluation : 0;
   return std::make_unique<Dds>(settings, problem.stopping.maxEvaluations - made,
                                continues || problem.initialSample.includeInitialParameters, std::move(problem.bounds),
-                               problem.evaluator, problem.random);
+                               problem.evaluator, problem.random, std::move(problem.feasibility));
 }
 
 SearchSummary DdsMethod::run(SearchProblem problem, const PeriodicStep& /*periodicStep*/) const {

@@ -4,6 +4,7 @@
 #include <span>
 
 #include "algorithms/numbers/uniform_generator.h"
+#include "algorithms/searches/feasible_points.h"
 #include "algorithms/searches/search_algorithm.h"
 #include "algorithms/searches/search_method.h"
 #include "evaluation/evaluator.h"
@@ -17,15 +18,15 @@ struct DdsSettings {
 /// Dynamically Dimensioned Search after Tolson and Shoemaker (2007), doi:10.1029/2005WR004723. One candidate at a time:
 /// the best set with some parameters perturbed, ever fewer of them as the budget is used up.
 ///
-/// Differs from the paper in three ways: the start points count as evaluations in the inclusion probability, a point
-/// reflected past the opposite bound is set to the bound that it violated first, and of the two normal deviates that
-/// the polar method yields one is discarded.
+/// Differs from the paper in four ways: the start points count as evaluations in the inclusion probability, a point
+/// reflected past the opposite bound is set to the bound that it violated first, of the two normal deviates that the
+/// polar method yields one is discarded, and a candidate that violates a constraint is drawn again.
 class Dds final : public SearchAlgorithm {
  public:
   /// `maxEvaluations` (m) is the whole budget, start points included. The evaluator and the stream must outlive the
   /// object.
   Dds(DdsSettings settings, int maxEvaluations, bool startFromInitial, SearchBounds bounds, Evaluator& evaluator,
-      UniformGenerator& random);
+      UniformGenerator& random, Feasibility feasibility = {});
 
   /// Evaluates the start points in one batch: the initial set, or ddsStartPointCount(m) random ones. Returns
   /// kDdsInvalidInput, without an evaluation, for a budget below 1 and for bounds that are missing, crossed or not
@@ -47,6 +48,7 @@ class Dds final : public SearchAlgorithm {
   SearchBounds bounds_;
   Evaluator& evaluator_;
   UniformGenerator& random_;
+  FeasiblePoints feasible_;
   SearchSummary summary_;
 };
 
@@ -69,9 +71,11 @@ double ddsNormalDeviate(const DeviateSource& deviate);
 double ddsReflect(double value, double lower, double upper);
 
 /// The best set with each parameter perturbed with the given probability, and at least one of them in any case; r is
-/// the standard deviation of the perturbation as a fraction of the range of the parameter.
+/// the standard deviation of the perturbation as a fraction of the range of the parameter. While the set cannot be run,
+/// the perturbations are drawn again, and after every ten draws the parameters, too; FeasiblePoints::draw() then draws
+/// the set back towards the best one.
 ParameterSet ddsCandidate(std::span<const double> best, const SearchBounds& bounds, double r,
-                          double inclusionProbability, const DeviateSource& deviate);
+                          double inclusionProbability, const DeviateSource& deviate, FeasiblePoints& feasible);
 
 /// DDS as a setup selects it.
 class DdsMethod final : public SearchMethod {

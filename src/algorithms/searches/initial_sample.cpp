@@ -222,6 +222,11 @@ std::vector<ParameterSet> drawInitialSample(const InitialSampleSettings& setting
   return sample;
 }
 
+std::size_t givenSetCount(const InitialSampleSettings& settings, std::size_t count) {
+  if (settings.generation == SampleGeneration::fromFile) return count;
+  return settings.includeInitialParameters ? std::min<std::size_t>(1, count) : 0;
+}
+
 std::vector<ParameterSet> readInitialSample(std::string_view fileName, std::string_view text,
                                             const SearchSpace& space) {
   std::vector<ParameterSet> sets;

@@ -51,6 +51,9 @@ std::vector<ParameterSet> drawInitialSample(const InitialSampleSettings& setting
                                             std::span<const ParameterSet> givenSets, const SearchBounds& bounds,
                                             std::size_t count, UniformGenerator& random);
 
+/// The number of sets at the beginning of such a sample that the setup gives.
+std::size_t givenSetCount(const InitialSampleSettings& settings, std::size_t count);
+
 /// Reads a sample: a header row with the names of the variable parameters in any order, then one set per row on the
 /// model scale; blank lines and lines that start with `#` are skipped. Columns are separated by tabs, semicolons,
 /// commas or blanks: the first of these, in this order, that the header contains. Returns the sets on the search scale,

@@ -12,7 +12,7 @@
 namespace mirevo {
 
 PopulationSearch::PopulationSearch(SearchProblem problem)
-    : problem_(std::move(problem)), stopping_(problem_.stopping) {}
+    : problem_(std::move(problem)), feasible_(problem_.feasibility), stopping_(problem_.stopping) {}
 
 bool PopulationSearch::isProblemValid() const {
   const SearchBounds& b = problem_.bounds;
@@ -29,6 +29,7 @@ SearchStatus PopulationSearch::initialise() {
   const std::size_t count = std::min(populationSize(), static_cast<std::size_t>(problem_.stopping.maxEvaluations));
   std::vector<ParameterSet> sample =
       drawInitialSample(problem_.initialSample, problem_.givenSample, problem_.bounds, count, problem_.random);
+  feasible_.replaceInSample(sample, givenSetCount(problem_.initialSample, count), problem_.bounds, problem_.random);
   std::vector<EvaluationResult> results = run(sample, DispatchMode::task);
   problem_.evaluator.settleAggregates(results);
   for (std::size_t i = 0; i < count && problem_.selector; ++i) problem_.selector->note(sample[i], results[i]);
@@ -57,6 +58,7 @@ SearchStatus PopulationSearch::advance() {
 void PopulationSearch::noteLoop() {
   summary_.populationSpread = populationSpread(population_, static_cast<int>(problem_.bounds.size()));
   summary_.populationRange = normalisedPopulationRange(population_, problem_.bounds);
+  summary_.replacedCount = feasible_.replacedCount();
   const Individual& best = population_.front();
   if (summary_.best.empty() || isBetter(best.value(), summary_.bestResult.aggregate)) {
     summary_.best = best.set;
@@ -115,15 +117,6 @@ bool PopulationSearch::isWithinBounds(const ParameterSet& set) const {
 ParameterSet PopulationSearch::clampedToBounds(ParameterSet set) const {
   for (std::size_t j = 0; j < set.size(); ++j) {
     set[j] = std::clamp(set[j], problem_.bounds.lower[j], problem_.bounds.upper[j]);
-  }
-  return set;
-}
-
-ParameterSet PopulationSearch::drawFrom(const Box& box) {
-  ParameterSet set(box.lower.size());
-  for (std::size_t j = 0; j < set.size(); ++j) {
-    const double value = box.lower[j] + draw() * (box.upper[j] - box.lower[j]);
-    set[j] = std::clamp(value, box.lower[j], box.upper[j]);
   }
   return set;
 }

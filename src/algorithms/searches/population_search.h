@@ -5,6 +5,7 @@
 #include <span>
 #include <vector>
 
+#include "algorithms/searches/feasible_points.h"
 #include "algorithms/searches/population.h"
 #include "algorithms/searches/search_algorithm.h"
 #include "algorithms/searches/search_problem.h"
@@ -57,7 +58,17 @@ class PopulationSearch : public SearchAlgorithm {
   /// Puts a point that rounding may have carried past a bound back on it.
   ParameterSet clampedToBounds(ParameterSet set) const;
   /// A uniformly random point of a box.
-  ParameterSet drawFrom(const Box& box);
+  ParameterSet drawFrom(const Box& box) { return drawUniformly(box.lower, box.upper, problem_.random); }
+  /// Every proposal passes one of these: FeasiblePoints::draw(), shortened() and drawnBack().
+  ParameterSet drawFeasible(const std::function<ParameterSet()>& drawPoint, std::span<const double> origin) {
+    return feasible_.draw(drawPoint, origin);
+  }
+  std::optional<ParameterSet> shortened(ParameterSet point, std::span<const double> origin, int mostHalvings) {
+    return feasible_.shortened(std::move(point), origin, mostHalvings);
+  }
+  ParameterSet drawnBack(ParameterSet point, std::initializer_list<std::span<const double>> origins) {
+    return clampedToBounds(feasible_.drawnBack(std::move(point), origins));
+  }
   /// Indices of `count` distinct members among the best `size` of m = `ranked` members sorted best first, drawn one
   /// after the other, the i-th best with a probability proportional to m + 1 − i; returned in ascending order.
   std::vector<std::size_t> drawSimplex(std::size_t count, std::size_t size, std::size_t ranked);
@@ -71,6 +82,7 @@ class PopulationSearch : public SearchAlgorithm {
   void noteLoop();
 
   SearchProblem problem_;
+  FeasiblePoints feasible_;
   StoppingTests stopping_;
   SearchSummary summary_;
 };

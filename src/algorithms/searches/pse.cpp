@@ -20,6 +20,10 @@ constexpr double kMutationSpread = 0.9;
 /// contracts. With 1 it gets stuck in curved valleys; with 1.2 it misses optima in ten dimensions.
 constexpr double kReflectionLength = 1.1;
 
+/// How often a reflection is halved while it violates a constraint, before a mutation takes its place. With more, small
+/// populations collapse on the constraint.
+constexpr int kReflectionHalvings = 1;
+
 /// With a surrogate model, the number of points of the population for each predicted minimum that is run.
 constexpr std::size_t kPointsPerMinimum = 4;
 
@@ -137,23 +141,30 @@ Pse::Offspring Pse::makeOffspring(std::size_t parent) {
     return {mutation(parent, others, g), parent};
   }
   if (move >= settings_.reflectionProbability || u.failedMoves == kReflectionFailed) {
-    const ParameterSet point = pointOnRay(g, u.set, contractionFactor(bounds().size()));
-    return {clampedToBounds(point), parent, kContractionFailed};
+    ParameterSet point = clampedToBounds(pointOnRay(g, u.set, contractionFactor(bounds().size())));
+    return {drawnBack(std::move(point), {g, u.set}), parent, kContractionFailed};
   }
   return {reflection(parent, others, g), parent, kReflectionFailed};
 }
 
 ParameterSet Pse::reflection(std::size_t parent, std::span<const std::size_t> others, std::span<const double> g) {
-  ParameterSet point = pointOnRay(g, population_[parent].set, -kReflectionLength * reflectionFactor(bounds().size()));
-  return isWithinBounds(point) ? point : mutation(parent, others, g);
+  const ParameterSet& u = population_[parent].set;
+  ParameterSet point = pointOnRay(g, u, -kReflectionLength * reflectionFactor(bounds().size()));
+  const std::optional<ParameterSet> drawn =
+      isWithinBounds(point) ? shortened(std::move(point), g, kReflectionHalvings) : std::nullopt;
+  return drawn ? *drawn : mutation(parent, others, g);
 }
 
-/// Normally distributed about g in every parameter, with a standard deviation proportional to that of the simplex about
-/// g. A value outside the bounds is instead drawn uniformly from the range of the simplex.
 ParameterSet Pse::mutation(std::size_t parent, std::span<const std::size_t> others, std::span<const double> g) {
   std::vector<std::size_t> simplex(others.begin(), others.end());
   simplex.push_back(parent);
   const Box box = boundingBox(population_, simplex);
+  return drawFeasible([&] { return drawMutation(simplex, box, g); }, population_[parent].set);
+}
+
+/// Normally distributed about g in every parameter, with a standard deviation proportional to that of the simplex about
+/// g. A value outside the bounds is instead drawn uniformly from the range of the simplex.
+ParameterSet Pse::drawMutation(std::span<const std::size_t> simplex, const Box& box, std::span<const double> g) {
   ParameterSet point(g.begin(), g.end());
   for (std::size_t j = 0; j < point.size(); ++j) {
     double squares = 0.0;

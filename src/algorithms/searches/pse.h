@@ -29,10 +29,12 @@ struct PseSettings {
 /// `reflectionProbability`, an immediate contraction with `contractionProbability`, and an immediate mutation with the
 /// remaining probability. The offspring replaces u if it is better. A new point begins a step. A mutation is normally
 /// distributed about g, independently in every parameter, which restores the directions that the linear moves lose. It
-/// also replaces a reflection outside the bounds. c is that of SCE, a is 1.1 times that of SCE. With a surrogate model
-/// the most promising of several offspring of a point is run, and a quarter of the generation goes to the points where
-/// the model predicts the lowest values around each of the best points. What the alternatives cost is measured in
-/// docs/algorithms/pse.md and docs/algorithms/surrogate.md.
+/// also replaces a reflection outside the bounds. A reflection that violates a constraint is halved once, and then a
+/// mutation replaces it; a contraction is drawn back towards g, or u if g violates one, too; a mutation is drawn again.
+/// c is that of SCE, a is 1.1 times that of SCE. With a surrogate model the most promising of several offspring of a
+/// point is run, and a quarter of the generation goes to the points where the model predicts the lowest values around
+/// each of the best points. What the alternatives cost is measured in docs/algorithms/pse.md and
+/// docs/algorithms/surrogate.md.
 class Pse final : public PopulationSearch {
  public:
   Pse(const PseSettings& settings, const SimplexSettings& simplex, SearchProblem problem);
@@ -55,6 +57,7 @@ class Pse final : public PopulationSearch {
   Offspring mostPromisingOffspring(std::size_t parent);
   ParameterSet reflection(std::size_t parent, std::span<const std::size_t> others, std::span<const double> g);
   ParameterSet mutation(std::size_t parent, std::span<const std::size_t> others, std::span<const double> g);
+  ParameterSet drawMutation(std::span<const std::size_t> simplex, const Box& box, std::span<const double> g);
   void proposePredictedMinima(std::vector<Offspring>& offspring);
   void replaceParents(std::span<const Offspring> offspring, std::span<const ParameterSet> proposals);
 

@@ -23,13 +23,15 @@ struct SceSettings {
 ///   reflection g − a·(u − g), accepted if better than u (outside the bounds, a random point of the box of the complex
 ///   replaces it); else contraction g + c·(u − g), accepted if better than u; else a random point of the box of the
 ///   complex, always accepted unless its evaluation failed.
-/// The paper has a = 1 and c = 1/2. Here a = 0.75 + 0.5/n (at most 1) and c = 0.45 − 0.1/n, which needs about a seventh
-/// fewer evaluations on the test functions (docs/algorithms/sce.md). With a surrogate model a complex looks at
-/// reflections and contractions of several subcomplexes, runs the most promising one first and its counterpart next,
-/// and of several random points runs the most promising. In every step the complex that holds the best point of the
-/// loop first proposes the point where the model predicts the lowest value around its own best point. Complexes are
-/// independent of each other between two shuffles and advance together: the batch of a step holds the current proposal
-/// of every complex. Points, values and random numbers do not depend on how the batch is run.
+/// A reflection that violates a constraint is halved, at most twice, and then a random point replaces it; a contraction
+/// is drawn back towards g, or u if g violates one, too; a random point is drawn again. The paper has a = 1 and c =
+/// 1/2. Here a = 0.75 + 0.5/n (at most 1) and c = 0.45 − 0.1/n, which needs about a seventh fewer evaluations on the
+/// test functions (docs/algorithms/sce.md). With a surrogate model a complex looks at reflections and contractions of
+/// several subcomplexes, runs the most promising one first and its counterpart next, and of several random points runs
+/// the most promising. In every step the complex that holds the best point of the loop first proposes the point where
+/// the model predicts the lowest value around its own best point. Complexes are independent of each other between two
+/// shuffles and advance together: the batch of a step holds the current proposal of every complex. Points, values and
+/// random numbers do not depend on how the batch is run.
 class Sce final : public PopulationSearch {
  public:
   Sce(const SceSettings& settings, const SimplexSettings& simplex, SearchProblem problem);
@@ -70,6 +72,7 @@ class Sce final : public PopulationSearch {
   ParameterSet reflection(const Complex& complex);
   ParameterSet contraction(const Complex& complex);
   ParameterSet mutation(const Complex& complex);
+  ParameterSet randomPoint(const Complex& complex);
 
   SceSettings settings_;
   SimplexSettings simplex_;

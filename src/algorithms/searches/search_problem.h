@@ -9,6 +9,7 @@
 #include "algorithms/searches/stopping_criteria.h"
 #include "common/parameter_set.h"
 #include "evaluation/evaluator.h"
+#include "parameters/feasibility.h"
 
 namespace mirevo {
 
@@ -30,6 +31,7 @@ struct SearchProblem {
   UniformGenerator& random;
   ProposalSelector* selector = nullptr;             ///< of a surrogate-assisted search
   std::vector<EarlierSearch> earlierSearches = {};  ///< the searches that this one continues, in order
+  Feasibility feasibility = {};                     ///< which sets can be run, of a model with constraints
 };
 
 }  // namespace mirevo

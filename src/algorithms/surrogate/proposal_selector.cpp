@@ -143,8 +143,11 @@ std::size_t proposalsPerRun(const SurrogateSettings& settings) {
   return static_cast<std::size_t>((100 + rate - 1) / rate);
 }
 
-ProposalSelector::ProposalSelector(const SurrogateSettings& settings, SearchBounds bounds)
-    : settings_(settings), bounds_(std::move(bounds)), model_(makeModel(settings.modelType)) {}
+ProposalSelector::ProposalSelector(const SurrogateSettings& settings, SearchBounds bounds, Feasibility feasibility)
+    : settings_(settings),
+      bounds_(std::move(bounds)),
+      feasibility_(std::move(feasibility)),
+      model_(makeModel(settings.modelType)) {}
 
 std::vector<double> ProposalSelector::scaled(const ParameterSet& set) const {
   std::vector<double> point(set.size());
@@ -267,11 +270,16 @@ std::optional<ProposalSelector::MinimumInBox> ProposalSelector::minimumAround(co
   const bool hasIntegers =
       std::find(bounds_.isInteger.begin(), bounds_.isInteger.end(), true) != bounds_.isInteger.end();
   const auto asRun = [&](const std::vector<double>& point) { return hasIntegers ? scaled(unscaled(point)) : point; };
+  const auto canBeRun = [&](const std::vector<double>& point) {
+    return !feasibility_.isTested() || feasibility_.holds(unscaled(point));
+  };
   const auto predicted = [&](const std::vector<double>& trial) {
     const std::vector<double> point = asRun(trial);
-    return isLikelyToFail(point) ? kLikelyToFail : model_->predict(point);
+    return isLikelyToFail(point) || !canBeRun(point) ? kLikelyToFail : model_->predict(point);
   };
-  return MinimumInBox{asRun(patternSearch(predicted, centre, box, leastMoves)), box};
+  std::vector<double> minimum = asRun(patternSearch(predicted, centre, box, leastMoves));
+  if (!canBeRun(minimum)) return std::nullopt;
+  return MinimumInBox{std::move(minimum), box};
 }
 
 std::vector<PredictedMinimum> ProposalSelector::minima(std::span<const ParameterSet> centres) {

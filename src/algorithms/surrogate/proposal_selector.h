@@ -12,6 +12,7 @@
 #include "algorithms/surrogate/surrogate_model.h"
 #include "common/parameter_set.h"
 #include "common/settings/keyword_row.h"
+#include "parameters/feasibility.h"
 
 namespace mirevo {
 
@@ -56,7 +57,8 @@ std::size_t proposalsPerRun(const SurrogateSettings& settings);
 /// proposals that make the same model run are equal. Predictions rank proposals and do nothing else.
 class ProposalSelector final {
  public:
-  ProposalSelector(const SurrogateSettings& settings, SearchBounds bounds);
+  /// Points that cannot be run are no minima; proposals are not asked about.
+  ProposalSelector(const SurrogateSettings& settings, SearchBounds bounds, Feasibility feasibility = {});
 
   /// Remembers an evaluated point. A failed point is left out of fits, which its substitute value would distort, but is
   /// not run again. A repeated point is dropped: it would crowd others out of the neighbourhood.
@@ -72,9 +74,9 @@ class ProposalSelector final {
   std::vector<std::size_t> select(std::span<const ParameterSet> proposals, std::size_t count);
 
   /// For each of `centres` the point where the model fitted around it predicts the lowest value within the box of the
-  /// points that it is fitted to, as in a trust-region step. Left out are centres around which no model can be fitted,
-  /// and minima that have been evaluated already or are returned for an earlier centre (to within a thousandth of the
-  /// box).
+  /// points that it is fitted to, as in a trust-region step, and of those that can be run. Left out are centres around
+  /// which no model can be fitted, and minima that have been evaluated already or are returned for an earlier centre
+  /// (to within a thousandth of the box).
   std::vector<PredictedMinimum> minima(std::span<const ParameterSet> centres);
 
  private:
@@ -89,7 +91,7 @@ class ProposalSelector final {
     std::vector<double> point;
     Box box;  ///< of the points to which the model is fitted
   };
-  /// Relative to the bounds, like `centre`; empty where no model can be fitted.
+  /// Relative to the bounds, like `centre`; empty where no model can be fitted or the centre cannot be run.
   std::optional<MinimumInBox> minimumAround(const std::vector<double>& centre);
   /// Fits the model to the points with the indices `places` unless it is fitted to them already; false when it cannot
   /// be.
@@ -101,6 +103,7 @@ class ProposalSelector final {
 
   SurrogateSettings settings_;
   SearchBounds bounds_;
+  Feasibility feasibility_;
   std::unique_ptr<SurrogateModel> model_;
   std::vector<std::vector<double>> points_;  ///< evaluated points relative to the bounds, in order of evaluation
   std::vector<double> values_;               ///< their objective values

@@ -24,6 +24,7 @@ class RankEvaluator final : public Evaluator {
 
   /// Also throws FatalError, with the worker's own message, after a fatal error on a worker.
   std::vector<EvaluationResult> evaluateParameterSets(std::span<const ParameterSet> sets, DispatchMode mode) override;
+  UnfinishedBatch takeUnfinished() override { return ledger_.takeUnfinished(); }
   void settleAggregates(std::span<EvaluationResult> sample) override;
 
  private:

@@ -25,6 +25,7 @@
 #include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/paths.h"
+#include "common/run_files.h"
 #include "common/text.h"
 #include "platform/processes/argument_text.h"
 #include "platform/processes/process_folder.h"
@@ -199,7 +200,7 @@ void PosixProcessLauncher::prepareSlot(const LauncherSettings& settings, int num
   }
   makeProcessFolder(settings.baseFolder, slot.folder, settings.processFolderPrefix);
   if (!renewLog(slot)) {
-    fatalError(fmt::format("Unable to create {}/{}: {}", slot.folder, kBatchLogName, std::strerror(errno)));
+    fatalError(fmt::format("Unable to create {}/{}: {}", slot.folder, run_files::kBatchLog, std::strerror(errno)));
   }
   for (std::size_t i = 0; i < settings.batchItems.size(); ++i) {
     std::string file = slot.folder + settings.batchItems[i].batchFileName.substr(settings.baseFolder.size());
@@ -241,7 +242,7 @@ bool PosixProcessLauncher::renewLog(Slot& slot) {
   struct stat status {};
   if (slot.log >= 0 && ::fstat(slot.log, &status) == 0 && status.st_size == 0 && status.st_nlink > 0) return true;
   if (slot.log >= 0) ::close(slot.log);
-  const std::string path = slot.folder + "/" + kBatchLogName;
+  const std::string path = slot.folder + "/" + run_files::kBatchLog;
   slot.log = -1;
   if (::unlink(path.c_str()) != 0 && errno != ENOENT) return false;
   slot.log = openAboveStandard(path.c_str(), O_RDWR | O_CREAT | O_EXCL | O_APPEND, 0666);
@@ -260,7 +261,7 @@ void PosixProcessLauncher::createProcesses(int slotNumber) {
     slot.failure = {
         BatchFailure::Kind::couldNotStart, errno,
         fmt::format("{} could not be started: unable to create {}/{}: {}", baseName(slot.commands.front().file()),
-                    slot.folder, kBatchLogName, std::strerror(errno))};
+                    slot.folder, run_files::kBatchLog, std::strerror(errno))};
     return;
   }
   startItem(slot);

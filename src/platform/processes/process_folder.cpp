@@ -66,6 +66,10 @@ bool isFolder(const struct stat& status) {
   return S_ISDIR(status.st_mode);
 }
 
+bool isBatchLog(std::string_view name) {
+  return name == run_files::kBatchLog;
+}
+
 /// Removes a file, a link, or a folder with all its content, if there is one.
 void removeTree(const std::string& root) {
   // Depth-first without recursion: each folder is visited once to push its entries and, after these, once to remove it.
@@ -92,7 +96,12 @@ void removeTree(const std::string& root) {
     visits.push_back({visit.path, true});
     const auto names = namesIn(visit.path);
     if (!names) continue;
-    for (const std::string& name : *names) visits.push_back({visit.path + "/" + name, false});
+    // The root's batch log last: what an interruption leaves is still known for what it is.
+    for (const bool pushesLog : {true, false}) {
+      for (const std::string& name : *names) {
+        if ((visit.path == root && isBatchLog(name)) == pushesLog) visits.push_back({visit.path + "/" + name, false});
+      }
+    }
   }
 }
 
@@ -203,15 +212,23 @@ class FolderCopy final {
     }
     if (::mkdir(to.c_str(), S_IRWXU) != 0) fail("create the folder", to, errno);
     made_.push_back({to, status});
+    if (below.empty()) makeBatchLog(to);
     const bool holdsProcessFolders = processFolders_.liesIn(status);
     const RunMadeEntries runMade(from, *names);
     for (const std::string& name : *names) {
-      const bool isBatchLog = below.empty() && name == kBatchLogName;
+      const bool isOwnLog = below.empty() && isBatchLog(name);
       const bool isProcessFolder = holdsProcessFolders && processFolders_.contains(name);
-      if (isBatchLog || isProcessFolder || runMade.contains(name)) continue;
+      if (isOwnLog || isProcessFolder || runMade.contains(name)) continue;
       std::string path = below;
       copyEntry(path.append("/").append(name));
     }
+  }
+
+  /// First of all, so that the folder is known for what it is, however the copying ends.
+  static void makeBatchLog(const std::string& folder) {
+    const std::string path = folder + "/" + run_files::kBatchLog;
+    const Descriptor log(::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0666));
+    if (log.get() < 0) fail("create", path, errno);
   }
 
   void copyEntry(const std::string& path) {
@@ -251,6 +268,8 @@ std::string processFoldersInUse(std::string_view processFolderPrefix, std::strin
 }
 
 void makeProcessFolder(const std::string& source, const std::string& target, std::string_view processFolderPrefix) {
+  const std::string why = whyNotReplaceable(target, run_files::kProcessFolder);
+  if (!why.empty()) fatalError(fmt::format("{} has the name of a process folder. {}", target, why));
   removeTree(target);
   FolderCopy(source, target, processFolderPrefix).copyAll();
 }

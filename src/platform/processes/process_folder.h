@@ -5,18 +5,15 @@
 
 namespace mirevo {
 
-/// The file in a process folder that receives the output of its batch; every process folder has one.
-inline constexpr char kBatchLogName[] = "mirevo_batch.log";
-
 /// The file on which the process folders with that prefix are locked, each by its number (FileLock).
 std::string processLockPath(std::string_view processFolderPrefix);
 /// What to say when another run, `holder`, has locked one of them.
 std::string processFoldersInUse(std::string_view processFolderPrefix, std::string_view holder);
 
-/// Makes `target` a fresh copy of the folder `source`: an existing `target` is removed; files (sharing blocks with the
-/// original if the file system can), folders and links are copied with their modes and times, sockets and devices are
-/// not. Both paths are absolute. A link to a target inside `source` leads into the copy, one to a target outside leads
-/// there as before.
+/// Makes `target` a fresh copy of the folder `source`, with an empty batch log: an existing `target` is removed, unless
+/// it is not a process folder (whyNotReplaceable()); files (sharing blocks with the original if the file system can),
+/// folders and links are copied with their modes and times, sockets and devices are not. Both paths are absolute. A
+/// link to a target inside `source` leads into the copy, one to a target outside leads there as before.
 ///
 /// What runs have made in `source` is left out (RunMadeEntries): the logs, results and saved files of setups beside the
 /// model; the process folders of this run, `processFolderPrefix` followed by a number, and those of other runs,

@@ -1,18 +1,13 @@
 #include "platform/processes/run_made_entries.h"
 
 #include <algorithm>
-#include <array>
-#include <fcntl.h>
 #include <sys/stat.h>
-#include <unistd.h>
 #include <utility>
 
-#include "common/descriptor.h"
 #include "common/files.h"
 #include "common/run_files.h"
 #include "common/take_text.h"
 #include "common/text.h"
-#include "platform/processes/process_folder.h"
 
 namespace mirevo {
 namespace {
@@ -28,19 +23,6 @@ bool matches(std::string_view text, const RunFile& file) {
   return takeText(text, ".") && !takeDigits(text).empty() && text == file.extension;
 }
 
-/// Whether the file names this program in its first lines, as every log and result file does.
-bool namesThisProgram(const std::string& path) {
-  const Descriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
-  std::array<char, 1024> head{};
-  const ssize_t length = file.get() < 0 ? -1 : ::read(file.get(), head.data(), head.size());
-  if (length <= 0) return false;
-  const auto lines = splitLines({head.data(), static_cast<std::size_t>(length)});
-  return std::any_of(lines.begin(), lines.end(), [](std::string_view line) {
-    takeText(line, "# ");
-    return line.starts_with("Mirevo ");
-  });
-}
-
 /// Whether this is a process folder of a setup in another folder, or the lock on such folders.
 bool isProcessFolder(const std::string& path) {
   constexpr std::string_view kMark = run_files::kProcessFolder.stem;
@@ -49,7 +31,8 @@ bool isProcessFolder(const std::string& path) {
   std::string_view number = std::string_view(path).substr(mark + kMark.size());
   if (number == run_files::kProcessLock.extension) return true;
   struct stat status {};
-  return !takeDigits(number).empty() && number.empty() && ::stat((path + "/" + kBatchLogName).c_str(), &status) == 0;
+  return !takeDigits(number).empty() && number.empty() &&
+         ::stat((path + "/" + run_files::kBatchLog).c_str(), &status) == 0;
 }
 
 }  // namespace
@@ -77,7 +60,7 @@ bool RunMadeEntries::belongsToRunOf(std::string_view setup, std::string_view nam
   const auto file =
       std::find_if(files.begin(), files.end(), [rest](const RunFile& each) { return matches(rest, each); });
   if (file == files.end()) return false;
-  return !file->mayBeModels || namesThisProgram(folder_ + "/" + std::string(name));
+  return !file->mayBeModels || carriesMark(folder_ + "/" + std::string(name), *file);
 }
 
 }  // namespace mirevo

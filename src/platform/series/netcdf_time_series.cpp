@@ -12,6 +12,7 @@
 #include "common/text.h"
 #include "platform/series/netcdf_classic.h"
 #include "platform/series/netcdf_units.h"
+#include "platform/series/printed_units.h"
 
 namespace mirevo {
 namespace {
@@ -134,6 +135,8 @@ class Unpacking final {
 
   /// Takes numbers outside `valid_min`, `valid_max` and `valid_range` as missing, too.
   void applyValidRange(int file, int variable) {
+    // Its numbers, limits among them, are meant without a sign, which the file's type does not say.
+    if (equalIgnoringCase(textAttribute(file, variable, "_Unsigned"), "true")) return;
     const Numbers range = numbersAttribute(file, variable, "valid_range");
     if (range.values.size() == 2) {
       addLimit(range.type, range.values[0], true);
@@ -377,6 +380,15 @@ bool NetcdfTimeSeries::readItem(std::size_t place) {
 
 std::vector<double> NetcdfTimeSeries::readExactItem(std::size_t place) {
   return readValues(place).value_or(std::vector<double>(times_.size(), kNaN));
+}
+
+std::vector<double> NetcdfTimeSeries::storedUnits(std::size_t place, std::span<const double> values) {
+  const int variable = places_[place].variable;
+  nc_type type = NC_NAT;
+  if (nc_inq_vartype(file_, variable, &type) != NC_NOERR || type == NC_DOUBLE) return {};
+  if (type == NC_FLOAT) return singleUnits(values);
+  const double scale = numberAttribute(file_, variable, "scale_factor").value_or(1.0);
+  return std::vector<double>(values.size(), std::abs(scale));
 }
 
 }  // namespace mirevo

@@ -24,6 +24,7 @@ class NetcdfTimeSeries final : public StoredTimeSeries {
  private:
   bool readItem(std::size_t place) override;
   std::vector<double> readExactItem(std::size_t place) override;
+  std::vector<double> storedUnits(std::size_t place, std::span<const double> values) override;
   /// The values of an item, unpacked; nothing, with the last error, when that fails.
   std::optional<std::vector<double>> readValues(std::size_t place);
   const std::string& sourceName() const override { return fileName_; }

@@ -3,6 +3,7 @@
 #include <limits>
 
 #include "common/calendar.h"
+#include "platform/series/printed_units.h"
 
 namespace mirevo {
 
@@ -39,6 +40,13 @@ std::span<const double> StoredTimeSeries::exactValues(int item) {
     if (isMissing(read.values[k], deleteValue())) read.exact[k] = std::numeric_limits<double>::quiet_NaN();
   }
   return read.exact;
+}
+
+std::vector<double> StoredTimeSeries::units(int item) {
+  const std::span<const double> values = exactValues(item);
+  if (values.empty()) return {};
+  std::vector<double> units = storedUnits(static_cast<std::size_t>(item - 1), values);
+  return units.empty() ? printedUnits(values) : units;
 }
 
 }  // namespace mirevo

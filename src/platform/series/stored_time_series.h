@@ -21,6 +21,7 @@ class StoredTimeSeries : public TimeSeriesObject {
   std::span<const double> times() const final { return times_; }
   std::span<const float> values(int item) const final;
   std::span<const double> exactValues(int item) final;
+  std::vector<double> units(int item) final;
 
  protected:
   struct Item {
@@ -34,6 +35,8 @@ class StoredTimeSeries : public TimeSeriesObject {
   virtual bool readItem(std::size_t place) = 0;
   /// The values of an item that readItem() could read, in 64 bits; those that are missing need no mark.
   virtual std::vector<double> readExactItem(std::size_t place) = 0;
+  /// The units of an item that is not made of decimal digits; empty for one that is.
+  virtual std::vector<double> storedUnits(std::size_t /*place*/, std::span<const double> /*values*/) { return {}; }
   /// The name of the source, for messages.
   virtual const std::string& sourceName() const = 0;
 

@@ -40,6 +40,9 @@ class TimeSeriesObject {
   virtual std::span<const float> values(int item) const = 0;
   /// The same with all digits of the file, NaN where one is missing. Reads them at the first call.
   virtual std::span<const double> exactValues(int item) = 0;
+  /// The unit in which each of these is given in the file: a change by less may not show in it. NaN for a missing
+  /// value.
+  virtual std::vector<double> units(int item) = 0;
 };
 
 /// An object of the class for the ending of the file name; nullptr for an unknown ending. `reason` then names the known

@@ -194,6 +194,17 @@ SetupSection SetupSection::openItem(std::string_view prefix, std::size_t number)
                                 kItemCountKeyword, *wanted, present.empty() ? "none" : present));
 }
 
+std::optional<SetupSection> SetupSection::itemBeyond(std::string_view prefix, std::size_t count) const {
+  for (const auto& section : node_->sections()) {
+    const std::string& name = section->name();
+    if (!name.starts_with(prefix) || itemPattern(name) == name) continue;
+    const auto number = parseInteger(std::string_view(name).substr(prefix.size()));
+    if (number && static_cast<std::size_t>(*number) <= count) continue;
+    return SetupSection(*file_, *section, inside(path_, name), inside(pattern_, itemPattern(name)));
+  }
+  return std::nullopt;
+}
+
 std::string SetupSection::name() const {
   return node_->name();
 }

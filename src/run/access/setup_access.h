@@ -78,6 +78,9 @@ class SetupSection final {
   /// `PARAMETER_12` for the prefix `PARAMETER_`.
   SetupSection openItem(std::string_view prefix, std::size_t number) const;
 
+  /// The first item section in the file whose number is above `count`, without an echo in the log.
+  std::optional<SetupSection> itemBeyond(std::string_view prefix, std::size_t count) const;
+
   /// Writes the section's name to the log, for a section of which more is read after other sections.
   void echoName() const;
 

@@ -48,8 +48,16 @@ void RunLog::line(std::string_view text) {
   write(record);
 }
 
+void RunLog::reportLine(std::string_view text) {
+  if (text.starts_with(kWarning)) {
+    warning(text.substr(kWarning.size()));
+  } else {
+    line(text);
+  }
+}
+
 void RunLog::warning(std::string_view text) {
-  const std::string record = "Warning: " + std::string(text);
+  const std::string record = std::string(kWarning).append(text);
   if (!isClosed_) {
     line(record);
     if (++warningCount_ <= static_cast<int>(kMostWarningsKept)) warnings_.emplace_back(text);

@@ -26,6 +26,8 @@ class RunLog final {
 
   /// Writes one record; several lines if `text` has line ends.
   void line(std::string_view text);
+  /// Writes a line of a report of a search or analysis, as a warning if it begins like one.
+  void reportLine(std::string_view text);
   /// Writes a record that begins with "Warning: ", and passes it on to whoever listens. Of a closed log the listener
   /// alone gets it.
   void warning(std::string_view text);
@@ -49,6 +51,7 @@ class RunLog final {
   const std::string& writeError() const { return writeError_; }
 
  private:
+  static constexpr std::string_view kWarning = "Warning: ";
   static constexpr std::string_view kRefused =
       "The setup is refused: no model was run, and the next start replaces this log";
 

@@ -8,6 +8,7 @@
 
 #include "common/fatal_error.h"
 #include "common/files.h"
+#include "common/run_files.h"
 #include "common/text.h"
 #include "common/utf8.h"
 
@@ -114,6 +115,10 @@ std::vector<std::string> removeFailedRunFolders(const std::string& prefix, const
     const auto number = parseInteger(digits);
     const bool isMade = number && std::to_string(*number) == digits;
     if (!isMade || numbers.count(*number) > 0) continue;
+    if (const auto why = whyNotReplaceable(entry->path().string(), run_files::kFailedFolder); !why.empty()) {
+      problems.push_back(fmt::format("{} was not removed. {}", entry->path().string(), why));
+      continue;
+    }
     std::error_code reason;
     std::filesystem::remove_all(entry->path(), reason);
     if (reason) problems.push_back(fmt::format("{} was not removed: {}", entry->path().string(), reason.message()));

@@ -16,7 +16,7 @@ namespace mirevo {
 namespace {
 
 constexpr std::string_view kRefusal = "Error: Unable to continue the earlier run";
-constexpr std::string_view kRemedy = "Restart = 0 begins anew and keeps the earlier results under a numbered name.";
+constexpr std::string_view kRemedy = "Restart = 0 starts afresh and keeps the earlier results under a numbered name.";
 constexpr std::size_t kMostChangesShown = 20;
 
 [[noreturn]] void refuse(std::string_view detail) {

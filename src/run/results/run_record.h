@@ -36,6 +36,8 @@ struct RunRecord {
   std::optional<int> evaluations;
   std::optional<int> failed;
   std::vector<std::pair<std::string, int>> failuresByKind;
+  /// Of an analysis that did not come to its end, the evaluations of which it gives statistics; without any, nothing.
+  std::optional<int> analysed;
   /// Of one objective function, on the way to the aggregate.
   struct Scale {
     std::string objective;

@@ -1,6 +1,8 @@
 #include "run/results/run_results.h"
 
+#include <filesystem>
 #include <set>
+#include <system_error>
 #include <utility>
 
 #include <fmt/core.h>
@@ -62,6 +64,7 @@ RunResults::RunResults(const RunConfig& config, const SearchSpace& space, const 
       record_(files_.record, tableHead_) {
   if (config.task && config.restart != RestartMode::startAfresh) {
     auto record = record_.readEarlier();
+    earlierRunHasStatistics_ = record && record->analysed;
     const bool isDamaged = !record && readFileIfThere(files_.record);
     earlierRun_ = findEarlierRun(files_, config, columns_, std::move(record));
     if (earlierRun_ && isDamaged) {
@@ -79,16 +82,29 @@ void RunResults::open(const RunConfig& config, std::span<const ObservedSeries> o
   if (!config.task) return;
   lockFailedRuns(log);
   if (config.keepsSimulatedValues()) {
-    std::size_t count = 0;
-    for (const ObservedSeries& series : observed) count += series.values.size();
-    simulatedValues_.emplace(files_.simulatedValues, count);
+    const SeriesPrecision precision = config.task->keptPrecision();
+    simulatedValues_.emplace(files_.simulatedValues, simulatedValueCount(observed, precision), precision);
   }
   if (earlierRun_) {
     goOn(config, aggregator, log);
   } else {
     if (config.restart != RestartMode::startAfresh)
-      log.line("Restart: there are no earlier results to go on from, the run begins anew");
+      log.line("Restart: there are no earlier results to go on from, the run starts afresh");
     startAfresh(config, log);
+  }
+}
+
+void RunResults::requireReplaceableFiles(const RunConfig& config) const {
+  if (!config.task) return;
+  std::vector<RunFile> files{names_.results,     names_.restart,          names_.simulatedValues,
+                             names_.record,      names_.failures,         run_files::kSeries,
+                             run_files::kReport, run_files::kSavedFolder, run_files::kOwnFailedRuns};
+  files.insert(files.end(), names_.tables.begin(), names_.tables.end());
+  for (const RunFile& file : files) requireReplaceable(runFilePath(filePrefix_, file), file);
+  requireReplaceable(pathBeside(filePrefix_, run_files::kFailedRuns), run_files::kFailedRuns);
+  if (!config.task->report().hasBands) return;
+  for (int number = 1; number <= static_cast<int>(config.measures.size()); ++number) {
+    requireReplaceable(runFilePath(filePrefix_, run_files::kBand, number), run_files::kBand);
   }
 }
 
@@ -150,8 +166,19 @@ void RunResults::startAfresh(const RunConfig& config, RunLog& log) {
   table_.open(files_.results, headLines(config, record), columns_);
 }
 
+void RunResults::removeStatistics(const RunConfig& config) const {
+  std::vector<std::string> paths;
+  for (const RunFile& table : names_.tables) paths.push_back(runFilePath(filePrefix_, table));
+  for (int measure = 1; measure <= static_cast<int>(config.measures.size()); ++measure) {
+    paths.push_back(runFilePath(filePrefix_, run_files::kBand, measure));
+  }
+  std::error_code ignored;
+  for (const std::string& path : paths) std::filesystem::remove(path, ignored);
+}
+
 void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggregator, RunLog& log) {
   EarlierRun run = *std::exchange(earlierRun_, std::nullopt);
+  if (earlierRunHasStatistics_) removeStatistics(config);
   std::map<int, std::vector<double>> failedSets;
   std::set<int> failed;
   std::set<int> succeeded;
@@ -164,6 +191,7 @@ void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggreg
   for (const FailureRow& row : earlier.rows) failures[row.number] = row.failure;
   std::optional<std::map<int, std::vector<double>>> values;
   if (simulatedValues_) values = simulatedValues_->takeUp(succeeded);
+  const std::size_t withoutValues = values ? succeeded.size() - values->size() : 0;
   auto records = earlierRecords(run, failures, std::move(values));
 
   RunRecord record = recordOf(config, log);
@@ -182,6 +210,12 @@ void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggreg
   if (earlier.unknown > 0) {
     log.line(fmt::format("Restart: why evaluations failed is not known any more of {}: {} does not say it",
                          earlier.unknown, files_.failures));
+  }
+  if (withoutValues > 0) {
+    log.line(
+        fmt::format("Restart: {} evaluations are made again: {} does not hold their simulated values, or, as one of "
+                    "an earlier version, not with all digits",
+                    withoutValues, files_.simulatedValues));
   }
   log.line(fmt::format("Restart: {} evaluations are taken from {}", records.size(), files_.results));
   earlierEvaluations_.emplace(space_, aggregator, std::move(records));

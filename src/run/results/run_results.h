@@ -39,6 +39,9 @@ class RunResults final {
   void open(const RunConfig& config, std::span<const ObservedSeries> observed, const ObjectiveAggregator& aggregator,
             RunLog& log);
 
+  /// Throws FatalError if a file or folder that this run would write, rename or remove is not one of a run's.
+  void requireReplaceableFiles(const RunConfig& config) const;
+
   /// Closes what stands beside the table. Throws FatalError when what was written did not all arrive.
   void close();
 
@@ -58,6 +61,8 @@ class RunResults final {
   void lockFailedRuns(RunLog& log);
   void startAfresh(const RunConfig& config, RunLog& log);
   void keepEarlierFiles(const RunConfig& config, RunLog& log) const;
+  /// Those of an unfinished run do not count any more when it goes on, and can be computed again.
+  void removeStatistics(const RunConfig& config) const;
   void goOn(const RunConfig& config, const ObjectiveAggregator& aggregator, RunLog& log);
 
   SearchSpace space_;
@@ -67,6 +72,7 @@ class RunResults final {
   ResultFileNames names_;
   RestartFiles files_;
   std::optional<EarlierRun> earlierRun_;
+  bool earlierRunHasStatistics_ = false;  ///< of an analysis that did not come to its end
   ResultFile table_;
   FileLock failedRunsLock_;  ///< on `calSimErr.dat`
   FailedRunFile failedRuns_;

@@ -15,6 +15,8 @@ namespace {
 
 /// The last bytes show whether a machine stores numbers in another byte order.
 constexpr std::uint64_t kFormatMark = 0x4d69726576307631ULL;
+/// Exact values, which earlier versions kept in 32 bits under the other mark.
+constexpr std::uint64_t kExactFormatMark = 0x4d69726576307632ULL;
 
 template <class Number>
 void appendBytes(std::string& bytes, const Number& number) {
@@ -28,21 +30,21 @@ Number numberAt(std::string_view bytes, std::size_t offset) {
   return number;
 }
 
-std::string head(std::size_t valueCount) {
+}  // namespace
+
+SimulatedValuesFile::SimulatedValuesFile(std::string path, std::size_t valueCount, SeriesPrecision precision)
+    : path_(std::move(path)), valueCount_(valueCount), precision_(precision) {}
+
+std::string SimulatedValuesFile::head() const {
   std::string bytes;
-  appendBytes(bytes, kFormatMark);
-  appendBytes(bytes, static_cast<std::uint64_t>(valueCount));
+  appendBytes(bytes, precision_ == SeriesPrecision::exact ? kExactFormatMark : kFormatMark);
+  appendBytes(bytes, static_cast<std::uint64_t>(valueCount_));
   return bytes;
 }
 
-}  // namespace
-
-SimulatedValuesFile::SimulatedValuesFile(std::string path, std::size_t valueCount)
-    : path_(std::move(path)), valueCount_(valueCount) {}
-
 void SimulatedValuesFile::create() {
   file_.open(path_);
-  file_.append(head(valueCount_));
+  file_.append(head());
 }
 
 std::string SimulatedValuesFile::encode(int number, const std::vector<double>& values) const {
@@ -61,7 +63,7 @@ void SimulatedValuesFile::add(const EvaluationResult& result) {
 std::map<int, std::vector<double>> SimulatedValuesFile::takeUp(const std::set<int>& numbers) {
   std::string reason;
   const std::string content = readFileIfThere(path_).value_or("");
-  std::string kept = head(valueCount_);
+  std::string kept = head();
   std::map<int, std::vector<double>> found;
   const std::size_t contentLength = sizeof(std::int64_t) + valueCount_ * sizeof(double);
   const std::size_t recordLength = contentLength + sizeof(std::uint64_t);

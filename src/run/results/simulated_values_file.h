@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "evaluation/evaluation_result.h"
+#include "measures/observed_series.h"
 #include "run/results/record_file.h"
 
 namespace mirevo {
@@ -18,13 +19,13 @@ namespace mirevo {
 class SimulatedValuesFile final {
  public:
   /// `valueCount`: values of one evaluation.
-  SimulatedValuesFile(std::string path, std::size_t valueCount);
+  SimulatedValuesFile(std::string path, std::size_t valueCount, SeriesPrecision precision = SeriesPrecision::single);
 
   /// Creates the file, replacing an existing one. Throws FatalError.
   void create();
   /// Continues the file of an interrupted run: keeps the records of the evaluations with these numbers, appends to them
   /// from now on, and returns their values by number. Records that are cut off, damaged or of other evaluations are
-  /// dropped. Throws FatalError when the file cannot be written.
+  /// dropped, and so are all of a file of another precision. Throws FatalError when the file cannot be written.
   std::map<int, std::vector<double>> takeUp(const std::set<int>& numbers);
 
   /// Writes the values of a successful evaluation. Throws FatalError when that fails.
@@ -35,10 +36,12 @@ class SimulatedValuesFile final {
   const std::string& path() const { return path_; }
 
  private:
+  std::string head() const;
   std::string encode(int number, const std::vector<double>& values) const;
 
   std::string path_;
   std::size_t valueCount_;
+  SeriesPrecision precision_;
   RecordFile file_;
 };
 

@@ -96,7 +96,7 @@ std::string setupSummary(const RunConfig& config, const SearchSpace& space, std:
   summary.line("Model evaluations planned: {}{}", config.plannedEvaluations(),
                config.task && config.task->hasFinalRun() ? " and a final model run" : "");
   if (config.task) {
-    for (const std::string& text : config.task->summaryLines(space.size())) summary.line("{}", text);
+    for (const std::string& text : config.task->summaryLines(space)) summary.line("{}", text);
   }
   summary.line("Simultaneous simulations: {}{}", config.simultaneousSimulations,
                config.useSingleThread ? ", one thread each" : "");

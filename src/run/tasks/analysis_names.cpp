@@ -11,7 +11,7 @@ AnalysisNames analysisNames(const TaskContext& context) {
 
 void logReport(const TaskContext& context, std::span<const std::string> report) {
   context.log.line("");
-  for (const std::string& line : report) context.log.line(line);
+  for (const std::string& line : report) context.log.reportLine(line);
 }
 
 }  // namespace mirevo

@@ -8,6 +8,7 @@
 
 #include "common/text.h"
 #include "run/access/file_validation.h"
+#include "run/tasks/infeasible_sets.h"
 
 namespace mirevo {
 namespace {
@@ -169,11 +170,11 @@ std::string OptimisationTask::description() const {
                      usesSurrogate() ? " with surrogate model" : "");
 }
 
-std::vector<std::string> OptimisationTask::summaryLines(std::size_t variableCount) const {
+std::vector<std::string> OptimisationTask::summaryLines(const SearchSpace& space) const {
   if (!usesSurrogate()) return {};
   return {fmt::format(
       "Surrogate model: {} fitted to the {} nearest sets, chooses one of {} proposals; loops without it: {}",
-      surrogateModelName(surrogate), neighbourhoodSize(surrogate, variableCount), proposalsPerRun(surrogate),
+      surrogateModelName(surrogate), neighbourhoodSize(surrogate, space.size()), proposalsPerRun(surrogate),
       surrogate.initialGenerations)};
 }
 
@@ -183,6 +184,17 @@ std::optional<OneSlotOnly> OptimisationTask::needsOneSlot() const {
                      kAlgorithmKeyword, method->facts().runsAtOnceUnderMpi};
 }
 
+/// Warns of sets of the initial sample that are not drawn and cannot be run.
+void OptimisationTask::warnOfGivenSets(const TaskContext& context, const SearchProblem& problem) const {
+  std::vector<ParameterSet> given;
+  if (initialSample.includeInitialParameters) given.push_back(problem.bounds.initial);
+  given.insert(given.end(), problem.givenSample.begin(), problem.givenSample.end());
+  const auto most = static_cast<std::size_t>(
+      std::min<std::int64_t>(std::max<std::int64_t>(method->populationSize(), 1), stopping.maxEvaluations));
+  if (given.size() > most) given.resize(most);
+  warnOfInfeasibleSets(context, given, "given sets of the initial sample", stopping.maxEvaluations);
+}
+
 SearchSummary OptimisationTask::search(const TaskContext& context) const {
   UniformGenerator random(randomSeed);
   SearchProblem problem{searchBounds(context.space), stopping, initialSample, {}, context.evaluator, random};
@@ -190,9 +202,11 @@ SearchSummary OptimisationTask::search(const TaskContext& context) const {
   if (method->facts().drawsInitialSample && initialSample.generation == SampleGeneration::fromFile) {
     problem.givenSample = loadInitialSample(initialSample.fileName, context.space);
   }
+  problem.feasibility = context.feasibility;
+  warnOfGivenSets(context, problem);
   std::optional<ProposalSelector> selector;
-  if (usesSurrogate()) problem.selector = &selector.emplace(surrogate, problem.bounds);
-  return method->run(std::move(problem), [&context](std::string_view line) { context.log.line(line); });
+  if (usesSurrogate()) problem.selector = &selector.emplace(surrogate, problem.bounds, problem.feasibility);
+  return method->run(std::move(problem), [&context](std::string_view line) { context.log.reportLine(line); });
 }
 
 TaskOutcome OptimisationTask::run(const TaskContext& context) {
@@ -201,6 +215,11 @@ TaskOutcome OptimisationTask::run(const TaskContext& context) {
   const SearchSummary summary = search(context);
   context.log.line("");
   context.log.line(summary.terminationMessage);
+  if (summary.replacedCount > 0) {
+    context.log.line(
+        fmt::format("Proposed points that violated a constraint and were replaced before their evaluation: {}",
+                    summary.replacedCount));
+  }
   const std::vector<ParameterSet> best{summary.best};
   if (best.front().empty()) return {summary.terminationMessage};
   if (context.searchEnded) context.searchEnded(summary);

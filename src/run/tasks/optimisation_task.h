@@ -19,7 +19,7 @@ class OptimisationTask final : public Task {
   void read(const TaskReading& reading) override;
   bool mayHaveInitialSample() const override { return true; }
   std::string description() const override;
-  std::vector<std::string> summaryLines(std::size_t variableCount) const override;
+  std::vector<std::string> summaryLines(const SearchSpace& space) const override;
   int plannedEvaluations(std::size_t /*variableCount*/) const override { return stopping.maxEvaluations; }
   bool hasFinalRun() const override { return true; }
   bool drawsRandomNumbers() const override { return true; }
@@ -42,6 +42,7 @@ class OptimisationTask final : public Task {
   void readMethod(const TaskReading& reading, const SetupSection& section) const;
   void readStopping(const SetupSection& section);
   void readSurrogate(const TaskReading& reading, const SetupSection& section, const SetupSection& stoppingSection);
+  void warnOfGivenSets(const TaskContext& context, const SearchProblem& problem) const;
   SearchSummary search(const TaskContext& context) const;
 
   std::vector<EarlierSearch> earlierSearches_;

@@ -4,6 +4,7 @@
 
 #include "common/fatal_error.h"
 #include "common/text.h"
+#include "run/tasks/infeasible_sets.h"
 
 namespace mirevo {
 namespace {
@@ -126,6 +127,7 @@ TaskOutcome ScenarioTask::run(const TaskContext& context) {
   const std::vector<ParameterSet> sets = settings.type == ScenarioType::singleRun
                                              ? std::vector<ParameterSet>{context.space.initial}
                                              : scenarioSets(settings.runs, context.parameters);
+  warnOfInfeasibleSets(context, sets, "scenarios", static_cast<int>(sets.size()));
   context.evaluator.evaluateParameterSets(sets, DispatchMode::task);
   return {std::string(kEndOfTask)};
 }

@@ -3,12 +3,14 @@
 #include <algorithm>
 #include <cmath>
 #include <limits>
+#include <map>
 #include <utility>
 
 #include <fmt/format.h>
 
 #include "algorithms/analyses/covariance.h"
 #include "common/calendar.h"
+#include "evaluation/stored_results.h"
 #include "measures/period_series.h"
 #include "run/tasks/analysis_names.h"
 
@@ -69,7 +71,8 @@ ComparedValues compareSeries(const TaskContext& context, std::span<const Evaluat
   std::vector<std::size_t> taken;
   std::size_t first = 0;
   for (const ObservedSeries& series : context.observedSeries) {
-    const std::size_t begin = std::exchange(first, first + series.values.size());
+    const std::size_t count = series.values.size();
+    const std::size_t begin = std::exchange(first, first + 2 * count);  // values, then their units
     const bool counts =
         std::any_of(context.objectives.begin(), context.objectives.end(), [&](const ObjectiveFunction& objective) {
           return std::count(objective.measures.begin(), objective.measures.end(), series.measure) > 0;
@@ -79,20 +82,18 @@ ComparedValues compareSeries(const TaskContext& context, std::span<const Evaluat
                                         [&](std::size_t other) { return isSamePair(measure, measures[other]); });
     if (!counts || isRepeated) continue;
     taken.push_back(series.measure);
-    std::vector<std::vector<double>> runs;
+    // The run that shows most digits tells the unit: in another one all values may end with zeros.
+    std::vector<double> units(count, std::numeric_limits<double>::quiet_NaN());
     for (std::size_t i = 0; i < results.size(); ++i) {
       if (!results[i].ok()) continue;
-      const auto from = results[i].simulatedValues.begin() + static_cast<std::ptrdiff_t>(begin);
-      runs.emplace_back(from, from + static_cast<std::ptrdiff_t>(series.values.size()));
-      compared.simulated[i].insert(compared.simulated[i].end(), runs.back().begin(), runs.back().end());
+      const std::span<const double> kept = std::span(results[i].simulatedValues).subspan(begin, 2 * count);
+      compared.simulated[i].insert(compared.simulated[i].end(), kept.begin(), kept.begin() + count);
+      for (std::size_t t = 0; t < count; ++t) units[t] = std::fmin(units[t], kept[count + t]);
     }
-    compared.series.insert(compared.series.end(), series.values.size(), series.measure);
-    if (!runs.empty()) {
-      const std::vector<double> units = printedUnits(runs.front(), runs);
-      compared.units.insert(compared.units.end(), units.begin(), units.end());
-    }
+    for (const double unit : units) compared.units.push_back(std::isnan(unit) ? 0.0 : unit);
+    compared.series.insert(compared.series.end(), count, series.measure);
     const std::int64_t origin = secondNumber(series.start);
-    for (std::size_t t = 0; t < series.values.size(); ++t) {
+    for (std::size_t t = 0; t < count; ++t) {
       const bool isAbove = results.front().ok() && results.front().simulatedValues[begin + t] > series.values[t];
       const double weight = isAbove ? measure.weightAbove : measure.weight;
       compared.observed.push_back(weight == 0.0 ? std::numeric_limits<double>::quiet_NaN() : series.values[t]);
@@ -171,10 +172,10 @@ int SensitivityTask::plannedEvaluations(std::size_t variableCount) const {
   return 1 + perParameter * static_cast<int>(variableCount);
 }
 
-TaskOutcome SensitivityTask::run(const TaskContext& context) {
+TaskOutcome SensitivityTask::outcomeOf(const TaskContext& context, Evaluator& evaluator) const {
   TaskOutcome outcome{std::string(kEndOfTask)};
   const std::vector<int> fieldWidths = ofVariableParameters(context.fieldWidths, context.parameters);
-  LocalSensitivity sensitivity = localSensitivity(settings, context.space, context.evaluator, fieldWidths);
+  LocalSensitivity sensitivity = localSensitivity(settings, context.space, evaluator, fieldWidths);
   Linearised found;
   if (settings.calculatesCovariance) found = linearised(context, sensitivity);
   if (found.model) takeObservations(*found.model, sensitivity);
@@ -182,8 +183,29 @@ TaskOutcome SensitivityTask::run(const TaskContext& context) {
   outcome.report = formatSensitivity(sensitivity, names);
   outcome.tables = sensitivityTables(sensitivity, names);
   if (settings.calculatesCovariance) addCovariance(context, sensitivity.plan.sets.front(), found, outcome);
+  return outcome;
+}
+
+TaskOutcome SensitivityTask::run(const TaskContext& context) {
+  TaskOutcome outcome = outcomeOf(context, context.evaluator);
   logReport(context, outcome.report);
   return outcome;
+}
+
+std::optional<TaskOutcome> SensitivityTask::unfinishedOutcome(const TaskContext& context,
+                                                              const UnfinishedBatch& made) const {
+  std::map<int, EvaluationResult> results;
+  for (const EvaluationResult& result : made.results) {
+    if (result.ok()) results[result.number] = result;
+  }
+  if (!results.contains(1) || results.size() < 2) return std::nullopt;  // a derivative needs the base set and another
+  for (const EvaluationResult& result : made.results) results.try_emplace(result.number, result);
+  EvaluationResult missing;
+  missing.measureValues.assign(context.measures.size(), kFailedRunValue);
+  missing.objectiveValues.assign(context.objectives.size(), kFailedRunValue);
+  missing.failure = {EvaluationFailure::Kind::notKnown, "the run ended before it was made", {}};
+  StoredResults evaluator(std::move(results), std::move(missing));
+  return outcomeOf(context, evaluator);
 }
 
 }  // namespace mirevo

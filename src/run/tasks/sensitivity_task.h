@@ -18,10 +18,15 @@ class SensitivityTask final : public Task {
   bool keepsSimulatedValues() const override { return settings.calculatesCovariance; }
   SeriesPrecision keptPrecision() const override { return SeriesPrecision::exact; }
   TaskOutcome run(const TaskContext& context) override;
+  std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const override;
   TaskReport report() const override { return {.sensitivity = &settings}; }
 
   SensitivityType type = SensitivityType::local;
   SensitivitySettings settings;
+
+ private:
+  /// The analysis by the evaluations that `evaluator` makes, without the log.
+  TaskOutcome outcomeOf(const TaskContext& context, Evaluator& evaluator) const;
 };
 
 }  // namespace mirevo

@@ -2,7 +2,7 @@
 
 namespace mirevo {
 
-std::vector<std::string> Task::summaryLines(std::size_t /*variableCount*/) const {
+std::vector<std::string> Task::summaryLines(const SearchSpace& /*space*/) const {
   return {};
 }
 

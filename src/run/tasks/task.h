@@ -18,6 +18,7 @@
 #include "measures/objective_functions.h"
 #include "measures/observed_series.h"
 #include "measures/output_measure.h"
+#include "parameters/feasibility.h"
 #include "parameters/search_space.h"
 #include "run/access/setup_access.h"
 #include "run/progress/run_log.h"
@@ -58,6 +59,9 @@ struct TaskContext {
   std::span<const ObservedSeries> observedSeries = {};
   /// By model parameter, the width of the widest placeholder into which it is written; 0: none.
   std::vector<int> fieldWidths = {};
+  Feasibility feasibility = {};  ///< which sets can be run, of a model with constraints
+  /// Shows the user a warning that the log receives as well. May be empty.
+  std::function<void(std::string_view)> warnUser = {};
 };
 
 /// A file beside the results.
@@ -112,7 +116,9 @@ class Task {
   /// "Parameter optimisation: Dynamically Dimensioned Search"
   virtual std::string description() const = 0;
   /// Further lines for the summary of the setup.
-  virtual std::vector<std::string> summaryLines(std::size_t variableCount) const;
+  virtual std::vector<std::string> summaryLines(const SearchSpace& space) const;
+  /// Warnings for the log about settings that work but may not be meant.
+  virtual std::vector<std::string> warnings(const SearchSpace& /*space*/) const { return {}; }
 
   /// Number of planned evaluations, on which the failed-run limit is based.
   virtual int plannedEvaluations(std::size_t variableCount) const = 0;
@@ -128,6 +134,13 @@ class Task {
 
   /// Runs it. Throws FatalError and RunCancelled.
   virtual TaskOutcome run(const TaskContext& context) = 0;
+
+  /// What can be said of the evaluations `made` when an error or a cancellation has ended run(); nothing is logged.
+  /// Empty if nothing can, and for a task without statistics.
+  virtual std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& /*context*/,
+                                                       const UnfinishedBatch& /*made*/) const {
+    return std::nullopt;
+  }
 
   virtual TaskReport report() const { return {}; }
 

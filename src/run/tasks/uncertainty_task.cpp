@@ -2,8 +2,10 @@
 
 #include <fmt/format.h>
 
+#include "algorithms/analyses/sampled_distributions.h"
 #include "algorithms/analyses/series_band.h"
 #include "run/tasks/analysis_names.h"
+#include "run/tasks/infeasible_sets.h"
 
 namespace mirevo {
 namespace {
@@ -28,6 +30,20 @@ std::vector<std::string> reportBands(const TaskContext& context, std::span<const
   return lines;
 }
 
+TaskOutcome outcomeOf(const TaskContext& context, const UncertaintyOutcome& found) {
+  TaskOutcome outcome{std::string(kEndOfTask)};
+  const UncertaintySummary summary = summariseUncertainty(found, context.space);
+  const AnalysisNames names = analysisNames(context);
+  outcome.report =
+      formatUncertainty(summary, names, fileNameOf(runFilePath(context.filePrefix, run_files::kSampleCorrelation)));
+  outcome.report.insert(outcome.report.begin() + 1, setsOutsideBounds(found.sample, context.space));
+  outcome.tables = uncertaintyTables(summary, names);
+  const std::vector<std::string> bands = reportBands(context, found.results, outcome.files);
+  outcome.report.emplace_back();
+  outcome.report.insert(outcome.report.end(), bands.begin(), bands.end());
+  return outcome;
+}
+
 }  // namespace
 
 const TaskFacts& UncertaintyTask::facts() const {
@@ -43,6 +59,13 @@ void UncertaintyTask::read(const TaskReading& reading) {
   const SetupSection section = reading.target.open("UNCERTAINTY_ESTIMATION");
   UncertaintySection filled{settings, randomSeed};
   section.read(uncertaintySection(), filled);
+  if (const auto surplus = section.itemBeyond("PARAMETER_", reading.variableCount)) {
+    surplus->warn(surplus->name(),
+                  fmt::format("not read: PARAMETER_n is the distribution of the n-th of the {} variable parameters. "
+                              "If the sections are numbered by model parameter, each one that comes after a fixed or "
+                              "dependent parameter is taken for another parameter's",
+                              reading.variableCount));
+  }
   for (std::size_t i = 0; i < reading.variableCount; ++i) {
     const SetupSection item = section.openItem("PARAMETER_", i + 1);
     item.read(distributionSection(), settings.parameters.emplace_back());
@@ -54,20 +77,47 @@ std::string UncertaintyTask::description() const {
                      kSamplingTypeNames[settings.samplingType == SamplingType::latinHypercube ? 1 : 0].name);
 }
 
+std::vector<std::string> UncertaintyTask::summaryLines(const SearchSpace& space) const {
+  return distributionLines(settings, space);
+}
+
+std::vector<std::string> UncertaintyTask::warnings(const SearchSpace& space) const {
+  return distributionWarnings(settings, space);
+}
+
+/// `acceptance`: a line on the sets drawn, if any can be drawn again.
+std::vector<ParameterSet> UncertaintyTask::drawSample(const TaskContext& context, std::string& acceptance) const {
+  if (settings.parameters.empty()) return {};
+  const auto messages = [&](std::string_view text) { context.log.line(text); };
+  if (!settings.redrawsInfeasible) {
+    std::vector<ParameterSet> sample = uncertaintySample(settings, randomSeed, messages);
+    warnOfInfeasibleSets(context, sample, "sets of the sample", settings.sampleSize,
+                         "With Redraw_Infeasible = 1 in UNCERTAINTY_ESTIMATION sets are drawn until all can be run");
+    return sample;
+  }
+  FeasibleSample sample = feasibleUncertaintySample(settings, randomSeed, context.feasibility, messages);
+  const auto kept = static_cast<double>(sample.sets.size());
+  acceptance =
+      fmt::format("Redraw_Infeasible: {} sets that can be run out of {} drawn, an acceptance rate of {:.1f} %",
+                  sample.sets.size(), sample.drawnCount, 100.0 * kept / static_cast<double>(sample.drawnCount));
+  context.log.line(acceptance);
+  return std::move(sample.sets);
+}
+
 TaskOutcome UncertaintyTask::run(const TaskContext& context) {
-  const UncertaintyOutcome found = uncertaintyAnalysis(settings, randomSeed, context.evaluator,
-                                                       [&](std::string_view text) { context.log.line(text); });
-  TaskOutcome outcome{std::string(kEndOfTask)};
-  const UncertaintySummary summary = summariseUncertainty(found);
-  const AnalysisNames names = analysisNames(context);
-  outcome.report = formatUncertainty(summary, names);
-  outcome.tables = uncertaintyTables(summary, names);
+  std::string acceptance;
+  std::vector<ParameterSet> sample = drawSample(context, acceptance);
+  context.log.line(setsOutsideBounds(sample, context.space));
+  const UncertaintyOutcome found = uncertaintyAnalysis(std::move(sample), context.evaluator);
+  TaskOutcome outcome = outcomeOf(context, found);
+  if (!acceptance.empty()) outcome.report.insert(outcome.report.begin() + 1, acceptance);
   logReport(context, outcome.report);
-  const std::vector<std::string> bands = reportBands(context, found.results, outcome.files);
-  logReport(context, bands);
-  outcome.report.emplace_back();
-  outcome.report.insert(outcome.report.end(), bands.begin(), bands.end());
   return outcome;
+}
+
+std::optional<TaskOutcome> UncertaintyTask::unfinishedOutcome(const TaskContext& context,
+                                                              const UnfinishedBatch& made) const {
+  return outcomeOf(context, {made.sets, made.results});
 }
 
 }  // namespace mirevo

@@ -12,13 +12,19 @@ class UncertaintyTask final : public Task {
   std::vector<const SectionRow*> sections() const override;
   void read(const TaskReading& reading) override;
   std::string description() const override;
+  std::vector<std::string> summaryLines(const SearchSpace& space) const override;
+  std::vector<std::string> warnings(const SearchSpace& space) const override;
   int plannedEvaluations(std::size_t /*variableCount*/) const override { return settings.sampleSize; }
   bool drawsRandomNumbers() const override { return true; }
   bool keepsSimulatedValues() const override { return true; }
   TaskOutcome run(const TaskContext& context) override;
+  std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const override;
   TaskReport report() const override { return {.hasBands = true}; }
 
   UncertaintySettings settings;
+
+ private:
+  std::vector<ParameterSet> drawSample(const TaskContext& context, std::string& acceptance) const;
 };
 
 }  // namespace mirevo

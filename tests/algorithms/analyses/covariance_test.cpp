@@ -91,8 +91,80 @@ TEST(ParameterCovariance, TellsRoundingFromAnEffect) {
   EXPECT_THAT(parameterCovariance(model).kept, ElementsAre(0));
   model.widths = {10, 10};
   EXPECT_THAT(parameterCovariance(model).kept, ElementsAre(0, 1));
-  const std::vector<std::vector<double>> others{{1.25, 7, 0}};
-  EXPECT_EQ(printedUnits(std::vector<double>{120, 0, NAN}, others), (std::vector<double>{1, 0.01, 0}));
+  // Single units of the model's steps, and then of several on end, both interpolated.
+  model.residuals.assign(10, 0.1);
+  model.units.assign(10, 1);
+  model.widths = {1, 1};
+  model.jacobian = {{0, 0.3, 0.7, 0, 0, 0, 0.3, 0.7, 0, 0}, {0, 0, 0, 0.3, 1, 1, 1, 1, 0.7, 0}};
+  EXPECT_THAT(parameterCovariance(model).kept, ElementsAre(1));
+}
+
+/// Central differences, a fraction of the value, of a model that prints 300 values with so many decimals.
+ParameterCovariance ofPrinted(double (*value)(const ParameterSet&, double), int decimals, double fraction,
+                              const std::vector<double>& initial) {
+  const SearchSpace space = spaceOf(initial);
+  const PerturbationPlan plan =
+      planPerturbations({Differencing::central, PerturbationOption::value, fraction}, space, initial);
+  std::vector<std::vector<double>> simulated;
+  std::vector<double> observed;
+  for (const ParameterSet& set : plan.sets) {
+    simulated.emplace_back();
+    for (int i = 0; i < 300; ++i)
+      simulated.back().push_back(std::stod(fmt::format("{:.{}f}", value(set, i), decimals)));
+  }
+  for (int i = 0; i < 300; ++i) observed.push_back(simulated[0][static_cast<std::size_t>(i)] + 0.1 * std::sin(i * i));
+  auto model = linearise(plan, simulated, observed, {});
+  model->units.assign(300, std::pow(10.0, -decimals));
+  return parameterCovariance(*model);
+}
+
+TEST(ParameterCovariance, LeavesOutWhatRoundingHidesAndNothingElse) {
+  constexpr auto kOrthogonal = [](const ParameterSet& p, double i) {
+    return 3 + 0.1 * p[0] * std::sin(i / 7) + p[1] * std::cos(i / 11) + p[2] * std::sin(i / 3);
+  };
+  constexpr auto kReversed = [](const ParameterSet& p, double i) {
+    return 3 + p[0] * std::cos(i / 11) + p[1] * std::sin(i / 3) + 0.1 * p[2] * std::sin(i / 7);
+  };
+  constexpr auto kSum = [](const ParameterSet& p, double i) { return 3 + (p[0] + p[1]) * std::sin(i / 7); };
+  constexpr auto kSumAndOther = [](const ParameterSet& p, double i) {
+    return 3 + (p[0] + p[1]) * std::sin(i / 7) + p[2] * p[2] * std::cos(i / 11);
+  };
+  constexpr auto kFewRows = [](const ParameterSet& p, double i) {
+    return 3 + p[0] * std::sin(i / 7) + (i >= 100 && i < 110 ? p[1] : 0.0);
+  };
+  constexpr auto kFewRowsFirst = [](const ParameterSet& p, double i) {
+    return 3 + p[1] * std::sin(i / 7) + (i >= 100 && i < 110 ? p[0] : 0.0);
+  };
+  const std::string sum = "its effect cannot be told from that of the parameters before it";
+  const std::string lost = "the effect of its step is lost in the rounding of the model's output";
+  struct Case {
+    const char* what;
+    double (*value)(const ParameterSet&, double);
+    int decimals;
+    double fraction;
+    std::vector<double> initial;
+    std::vector<std::pair<std::size_t, std::string>> leftOut;
+  };
+  const Case cases[] = {
+      {"a weak one first", kOrthogonal, 2, 0.01, {1, 1, 1}, {{0, lost}}},
+      {"a weak one last", kReversed, 2, 0.01, {1, 1, 1}, {{2, lost}}},
+      {"a weak one, finer", kOrthogonal, 3, 0.01, {1, 1, 1}, {}},
+      {"a sum", kSum, 2, 0.01, {1, 2}, {{1, sum}}},
+      {"a sum at a small step", kSum, 3, 1e-3, {1, 2}, {{1, sum}}},
+      {"a sum and another", kSumAndOther, 2, 0.01, {1, 2, 1}, {{1, sum}}},
+      {"a sum and another at a small step", kSumAndOther, 3, 1e-3, {1, 2, 1}, {{1, sum}}},
+      {"a sum and another, all lost", kSumAndOther, 3, 1e-4, {1, 1, 1}, {{0, lost}, {1, lost}, {2, lost}}},
+      {"a few rows", kFewRows, 2, 0.01, {1, 2}, {}},
+      {"a few rows by one unit", kFewRows, 2, 0.01, {1, 0.5}, {}},
+      {"a few rows, first", kFewRowsFirst, 2, 0.01, {2, 1}, {}},
+  };
+  for (const Case& each : cases) {
+    std::vector<std::pair<std::size_t, std::string>> leftOut;
+    for (const LeftOutParameter& one : ofPrinted(each.value, each.decimals, each.fraction, each.initial).leftOut) {
+      leftOut.emplace_back(one.index, one.reason);
+    }
+    EXPECT_EQ(leftOut, each.leftOut) << each.what;
+  }
 }
 
 TEST(ParameterCovariance, SaysWhatTheCorrelationOfTheResidualsDoesToIt) {
@@ -104,6 +176,10 @@ TEST(ParameterCovariance, SaysWhatTheCorrelationOfTheResidualsDoesToIt) {
   EXPECT_THAT(formatCovariance(result, spaceOf({1}), std::vector<double>{1}),
               Contains("Lag-1 correlation of the residuals: 0.500, which makes the standard deviations about 1.7 times "
                        "too small, and the limits as much too narrow"));
+  model.residuals.assign(6, 0.0);
+  const ParameterCovariance perfect = parameterCovariance(model);
+  EXPECT_THAT(formatCovariance(perfect, spaceOf({1}), std::vector<double>{1}), Not(Contains(HasSubstr("Lag-1"))));
+  EXPECT_EQ(covarianceTables(perfect, spaceOf({1}), std::vector<double>{1}).back().headLines.size(), 1U);
 }
 
 TEST(ParameterCovariance, SaysWhenThereIsNothingToEstimateItFrom) {

@@ -81,6 +81,14 @@ TEST(PlanPerturbations, TakesItsStepsInsideTheBounds) {
   }
 }
 
+TEST(PlanPerturbations, NamesWhatHasASingleValue) {
+  // The integer's bounds may be 3 and 3.5: the space has the largest value and 1.
+  const SearchSpace space = spaceOf({{kNone, 3, 3, 3}, {kInteger, 3, 3, 4}});
+  const PerturbationPlan plan = planPerturbations({kForward, kOfValue, 0.1}, space, space.initial);
+  EXPECT_EQ(plan.differences[0].problem, "its bounds are equal");
+  EXPECT_EQ(plan.differences[1].problem, "its bounds leave a single value");
+}
+
 TEST(PlanPerturbations, NamesAStepThatRoundsAway) {
   const SearchSpace space = spaceOf({{kNone, 1e18, 1e18 - 1e4, 1e18 + 1e4}});
   const PerturbationPlan plan = planPerturbations({kForward, kOfRange, 1e-6}, space, space.initial);
@@ -182,6 +190,32 @@ TEST(LocalSensitivity, RanksByTheObservationsWhereThereAreSome) {
                                         "1.25;"))));
 }
 
+TEST(LocalSensitivity, SaysOnceThatOthersFitBetter) {
+  LocalSensitivity sensitivity;
+  sensitivity.results.resize(5);
+  const double aggregates[] = {4, 3, 2, 1, 5};
+  for (std::size_t i = 0; i < 5; ++i) {
+    sensitivity.results[i].number = static_cast<int>(i) + 1;
+    sensitivity.results[i].aggregate = aggregates[i];
+  }
+  sensitivity.results[0].unusedObservations = {{0, 10, ""}};
+  sensitivity.results[1].unusedObservations = {{0, 10, ""}};
+  sensitivity.results[3].unusedObservations = {{0, 9, ""}};
+  const auto warnings = [&] {
+    std::vector<std::string> found;
+    for (const std::string& line : formatSensitivity(sensitivity, {})) {
+      if (line.starts_with("Warning")) found.push_back(line.substr(0, line.find(';')));
+    }
+    return found;
+  };
+  EXPECT_THAT(warnings(), ElementsAre("Warning: 2 evaluations fit better than the base set, evaluation 3 best: its "
+                                      "aggregate is 2, not 4"));
+  sensitivity.results[0].simulatedValues = {1, 2};
+  sensitivity.results[2].simulatedValues = {1, NAN};
+  EXPECT_THAT(warnings(),
+              ElementsAre("Warning: evaluation 2 fits better than the base set: its aggregate is 3, not 4"));
+}
+
 TEST(LocalSensitivity, UsesTheOtherSideWhereOneFailed) {
   FunctionEvaluator evaluator([](const ParameterSet& p) {
     EvaluationResult result = evaluate(p);
@@ -226,6 +260,23 @@ TEST(Linearise, LeavesTheColumnOfAFailedSetUnknown) {
   const PerturbationPlan central = planPerturbations({kCentral, kOfRange, 0.25}, spaceOf({{kNone, 2, 0, 4}}), {{2.0}});
   EXPECT_THAT(differenceColumns(central, std::vector<std::vector<double>>{{5, 5}, {3, 2}, {6, NAN}})[0],
               ElementsAre(1.5, 3.0));
+}
+
+TEST(Linearise, SaysWhereAPerturbedRunHasNoValue) {
+  LocalSensitivity sensitivity;
+  const SearchSpace space = spaceOf({{kNone, 2, 0, 4}});
+  sensitivity.plan = planPerturbations({kCentral, kOfRange, 0.25}, space, space.initial);
+  sensitivity.results.resize(3);
+  const std::vector<std::vector<double>> simulated{{5, 5, 5, 5}, {3, 2, NAN, 3}, {6, NAN, NAN, NAN}};
+  const auto model = linearise(sensitivity.plan, simulated, std::vector<double>{1, 1, 1, NAN}, {});
+  takeObservations(*model, sensitivity);
+  EXPECT_THAT(sensitivity.plan.differences[0].warnings,
+              ElementsAre("one of its two runs has no value at 1 of 3 observations: the differences there are those of "
+                          "the other run and the base run"));
+  sensitivity.plan.differences[0].widthBelow = 0.0;  // as written
+  const std::vector<double> column = differenceColumns(sensitivity.plan, simulated)[0];
+  EXPECT_EQ(column[0], 1.5);
+  EXPECT_TRUE(std::isnan(column[1]) && std::isnan(column[2]));
 }
 
 }  // namespace

@@ -10,6 +10,7 @@
 #include "algorithms/numbers/sample_summary.h"
 #include "algorithms/numbers/uniform_generator.h"
 #include "matchers.h"
+#include "refusal.h"
 
 namespace mirevo {
 namespace {
@@ -52,6 +53,28 @@ TEST(UncertaintySample, LatinHypercubeHitsEachStratumOnceInRankOrder) {
   }
 }
 
+TEST(UncertaintySample, DrawsOnlySetsThatCannotBeRunAgain) {
+  const auto above = [](double limit) {
+    return Feasibility([limit](std::span<const double> set) -> std::optional<std::string> {
+      return set[0] > limit ? std::nullopt : std::optional<std::string>("too small");
+    });
+  };
+  for (const SamplingType type : {SamplingType::simpleRandom, SamplingType::latinHypercube}) {
+    const UncertaintySettings settings{type, 200, {{0.0, 1.0}, {3.0, 2.0}}};
+    const std::vector<ParameterSet> drawn = uncertaintySample(settings, 5);
+    const FeasibleSample sample = feasibleUncertaintySample(settings, 5, above(0.0));
+    ASSERT_EQ(sample.sets.size(), 200U);
+    for (std::size_t i = 0; i < 200; ++i) {
+      EXPECT_GT(sample.sets[i][0], 0.0);
+      EXPECT_EQ(sample.sets[i] == drawn[i], drawn[i][0] > 0.0);
+    }
+    EXPECT_NEAR(static_cast<double>(sample.drawnCount), 400, 80) << "half of the sets can be run";
+    EXPECT_EQ(feasibleUncertaintySample(settings, 5, {}).sets, drawn);
+    EXPECT_THAT(refusalOf([&] { feasibleUncertaintySample(settings, 5, above(40.0)); }),
+                StartsWith("Error: No parameter set found that satisfies the constraints\n"));
+  }
+}
+
 TEST(UncertaintyAnalysis, EvaluatesOneBatchAndLeavesFailuresOut) {
   int call = 0;
   FunctionEvaluator evaluator([&](const ParameterSet& set) {
@@ -60,10 +83,12 @@ TEST(UncertaintyAnalysis, EvaluatesOneBatchAndLeavesFailuresOut) {
     if (call > 3) result.failure = EvaluationFailure{};
     return result;
   });
-  const UncertaintyOutcome outcome = uncertaintyAnalysis({SamplingType::simpleRandom, 5, {{1.0, 0.0}}}, 1, evaluator);
+  const UncertaintyOutcome outcome =
+      uncertaintyAnalysis(uncertaintySample({SamplingType::simpleRandom, 5, {{1.0, 0.0}}}, 1), evaluator);
   ASSERT_EQ(evaluator.batches.size(), 1U);
   EXPECT_EQ(evaluator.batches[0].size(), 5U);
-  const UncertaintySummary summary = summariseUncertainty(outcome);
+  const SearchSpace space{.names = {"K"}, .lower = {0.0}, .upper = {5.0}, .transformation = {TransformationType::none}};
+  const UncertaintySummary summary = summariseUncertainty(outcome, space);
   EXPECT_EQ(summary.failedCount, 2U);
   EXPECT_EQ(summary.objectives[0].count, 3U);
   EXPECT_EQ(summary.objectives[0].mean, 2.0);
@@ -71,11 +96,11 @@ TEST(UncertaintyAnalysis, EvaluatesOneBatchAndLeavesFailuresOut) {
   EXPECT_DOUBLE_EQ(summary.objectives[0].quantiles[0], 1.1);
   EXPECT_EQ(summary.parameters[0].count, 5U);
   EXPECT_THAT(
-      formatUncertainty(summary, {{"K"}, {"bias", "peak"}, {"low"}}),
+      formatUncertainty(summary, {{"K"}, {"bias", "peak"}, {"low"}}, ""),
       ElementsAre(
           "Uncertainty analysis: 5 evaluations, 2 failed and left out of the statistics", "",
-          HasSubstr("Parameter (search scale)"),
-          "   K                                     1              0              1              1              1"
+          HasSubstr("Parameter (model scale)"),
+          "   K                                    1              0              1              1              1"
           "              1              1",
           "", HasSubstr("Std. deviation"), HasSubstr("bias "), HasSubstr("peak "), "", HasSubstr("95 %"),
           "   low                             2              1            1.1            1.5              2"

@@ -11,6 +11,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "common/run_files.h"
 #include "matchers.h"
 #include "platform/processes/process_folder.h"
 #include "processes.h"
@@ -117,9 +118,9 @@ TEST_F(PosixProcessLauncherTest, GivesTheBatchAPlainSurrounding) {
   ::signal(SIGUSR2, SIG_DFL);
 
   const std::string inFolder = folder_ / "run_Process1/in";
-  EXPECT_EQ(read(kBatchLogName), inFolder +
-                                     "\n[-x]\n[two words]\n[]\n/dev/null\n4\nSigBlk:\t0000000000000000\n"
-                                     "SigIgn:\t0000000000000000\n1 1 1 kept\nerror\n");
+  EXPECT_EQ(read(run_files::kBatchLog), inFolder +
+                                            "\n[-x]\n[two words]\n[]\n/dev/null\n4\nSigBlk:\t0000000000000000\n"
+                                            "SigIgn:\t0000000000000000\n1 1 1 kept\nerror\n");
   const std::string ids = read("in/group.txt");  // the group, then the process: one and the same
   EXPECT_EQ(ids.substr(0, ids.find('\n')) + "\n", ids.substr(ids.find('\n') + 1));
 }
@@ -156,16 +157,16 @@ TEST_F(PosixProcessLauncherTest, KeepsTheOutputOfTheLastRunAlone) {
   for (const std::string words : {"one\ntwo\n", "", "\x1b[1mbold\x1b[0m\r\n", "end without line end"}) {
     folder_.write("run_Process1/words.txt", words);
     EXPECT_EQ(run(), BatchStatus::succeeded);
-    EXPECT_EQ(read(kBatchLogName), words);
+    EXPECT_EQ(read(run_files::kBatchLog), words);
   }
   EXPECT_THAT(launcher_.lastOutput(1, 5), ElementsAre("end without line end"));
   // A batch that clears its folder before it works, as many do, leaves its log readable.
-  folder_.write("run_Process1/run.sh", "rm -f " + std::string(kBatchLogName) + "; echo said\n");
+  folder_.write("run_Process1/run.sh", "rm -f " + std::string(run_files::kBatchLog) + "; echo said\n");
   EXPECT_EQ(run(), BatchStatus::succeeded);
   EXPECT_THAT(launcher_.lastOutput(1, 5), ElementsAre("said"));
   folder_.write("run_Process1/run.sh", "echo again\n");
   EXPECT_EQ(run(), BatchStatus::succeeded);
-  EXPECT_EQ(read(kBatchLogName), "again\n");
+  EXPECT_EQ(read(run_files::kBatchLog), "again\n");
 }
 
 TEST_F(PosixProcessLauncherTest, MegabytesOfOutputAndClosedOutput) {

@@ -12,6 +12,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "common/run_files.h"
 #include "temporary_folder.h"
 
 namespace mirevo {
@@ -50,6 +51,7 @@ TEST(ProcessFolder, ReplacesWhatWasThere) {
   const TemporaryFolder folder;
   folder.write("base/run.sh", "new");
   folder.write("run_Process1/run.sh", "old");
+  folder.write("run_Process1/" + std::string(run_files::kBatchLog), "old");
   folder.write("run_Process1/left/over.txt", "old");
   fs::permissions(folder / "run_Process1/left", fs::perms::owner_read | fs::perms::owner_exec);
   folder.write("elsewhere/kept.txt", "kept");
@@ -59,6 +61,7 @@ TEST(ProcessFolder, ReplacesWhatWasThere) {
 
   EXPECT_EQ(folder.read("run_Process1/run.sh"), "new");
   EXPECT_FALSE(folder.exists("run_Process1/left"));
+  EXPECT_EQ(folder.read("run_Process1/" + std::string(run_files::kBatchLog)), "") << "known for what it is from now on";
   EXPECT_EQ(folder.read("elsewhere/kept.txt"), "kept");
 }
 
@@ -90,10 +93,11 @@ TEST(ProcessFolder, LinksLeadWhereTheyShould) {
 TEST(ProcessFolder, NeverCopiesWhatRunsMake) {
   const TemporaryFolder folder;
   for (const char* setup : {"cal.kdx", "cal.1.kdx", "in/deep/cal.KDX"}) folder.write(setup, "");
-  const std::map<std::string, std::string> made{{"cal_Process2/big.dat", ""},
-                                                {"other_Process1/" + std::string(kBatchLogName), "of another setup's"},
-                                                {"cal.log", "Warning: early\nMirevo 1.2, started\n"},
-                                                {"cal.2.dat", "# Title\n# Mirevo 1.2\n"}};
+  const std::map<std::string, std::string> made{
+      {"cal_Process2/big.dat", ""},
+      {"other_Process1/" + std::string(run_files::kBatchLog), "of another setup's"},
+      {"cal.log", "Warning: early\nMirevo 1.2, started\n"},
+      {"cal.2.dat", "# Title\n# Mirevo 1.2\n"}};
   std::istringstream madeByName(
       "in/deep/cal_Saved/1/out.csv cal_Saved/out.csv cal_Saved.12/out.csv cal_Failed17/run.sh cal_Optimisation.dat "
       "cal_Optimisation.3.dat cal.1_Sensitivity.dat cal_Band_2.csv cal_Band_2.1.csv cal_Report.html cal_Series.dat "

@@ -2,6 +2,7 @@
 
 #include <cmath>
 #include <fstream>
+#include <limits>
 #include <string>
 #include <tuple>
 
@@ -102,6 +103,17 @@ TEST(CsvTimeSeries, ReadsAColumnOnlyWhenItIsAskedFor) {
   EXPECT_THAT(valuesOf(series, 1), ElementsAre(1.0F, 2.0F));
   EXPECT_FALSE(series.getData(5));
   EXPECT_FALSE(series.getData(0));
+}
+
+TEST(CsvTimeSeries, TheDigitsOfAnItemTellItsUnit) {
+  CsvTimeSeries series;
+  ASSERT_TRUE(series.parse("s.csv",
+                           "time,fixed,significant,single,zero\n2001-01-01,1.20,1234.56,1.10000002384185791,0\n"
+                           "2001-01-02,,0.00123456,2,0\n2001-01-03,3.25,3,2.20000004768371582,0\n"));
+  EXPECT_THAT(series.units(1), ElementsAre(0.01, testing::IsNan(), 0.01));
+  EXPECT_THAT(series.units(2), ElementsAre(DoubleEq(0.01), DoubleEq(1e-8), DoubleEq(1e-5)));
+  EXPECT_NEAR(series.units(3)[2], 2.2 * std::numeric_limits<float>::epsilon(), 1e-12);
+  EXPECT_THAT(series.units(4), testing::Each(1.0));
 }
 
 TEST(CsvTimeSeries, CellsThatAreNoNumbersAreRefused) {

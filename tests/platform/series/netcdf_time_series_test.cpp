@@ -122,6 +122,9 @@ TEST(NetcdfTimeSeries, ReadsVariablesStationsAndPacking) {
     EXPECT_THAT(valuesOf(series, 4), ElementsAre(-999999.0F, -999999.0F, 100.0F));  // unwritten, then missing
     EXPECT_THAT(valuesOf(series, 5), ElementsAre(5.0F, 6.0F, 7.0F));
     EXPECT_FALSE(series.getData(6));
+    EXPECT_EQ(series.units(2)[2], 30.0 * static_cast<double>(std::numeric_limits<float>::epsilon()));
+    EXPECT_EQ(series.units(3)[0], 0.5);
+    EXPECT_EQ(series.units(5)[1], 1.0);
   }
 }
 

@@ -227,6 +227,8 @@ TEST(SimulatedValuesFile, KeepsWholeRecordsOfTheEvaluationsThatCount) {
   EXPECT_THAT(SimulatedValuesFile(folder / "v.bin", 2).takeUp({1, 2, 3}),
               ElementsAre(testing::Key(2), testing::Key(3)));
   EXPECT_THAT(SimulatedValuesFile(folder / "v.bin", 3).takeUp({1, 2, 3}), IsEmpty()) << "of other series";
+  folder.write("v.bin", whole);
+  EXPECT_THAT(SimulatedValuesFile(folder / "v.bin", 2, SeriesPrecision::exact).takeUp({1, 2, 3}), IsEmpty());
 }
 
 TEST(FailedRunFile, IsContinuedWithTheFailuresThatCount) {

@@ -11,6 +11,7 @@
 #include "refusal.h"
 #include "run/tasks/optimisation_task.h"
 #include "run/tasks/scenario_task.h"
+#include "run/tasks/uncertainty_task.h"
 
 namespace mirevo {
 namespace {
@@ -22,17 +23,29 @@ ModelParameter parameter(const char* name, ParameterType type, TransformationTyp
 class TasksTest : public ::testing::Test {
  protected:
   std::string run(Task& task) {
-    return task.run({space_, parameters_, {}, objectives_, evaluator_, log_}).terminationMessage;
+    TaskContext context{space_, parameters_, measures_, objectives_, evaluator_, log_};
+    context.feasibility = feasibility_;
+    context.warnUser = [this](std::string_view text) {
+      EXPECT_THAT(evaluator_.batches, IsEmpty()) << "before the first model run";
+      warnings_.emplace_back(text);
+    };
+    const TaskOutcome outcome = task.run(context);
+    report_ = outcome.report;
+    return outcome.terminationMessage;
   }
 
   std::vector<ModelParameter> parameters_{parameter("a", ParameterType::variable, TransformationType::none),
                                           parameter("b", ParameterType::fixed, TransformationType::none),
                                           parameter("c", ParameterType::variable, TransformationType::logarithmic),
                                           parameter("d", ParameterType::variable, TransformationType::integer)};
+  std::vector<OutputMeasure> measures_{1};
   std::vector<ObjectiveFunction> objectives_{1};
   SearchSpace space_ = BuildSearchSpace(parameters_);
   FunctionEvaluator evaluator_{[](const ParameterSet& set) { return resultOf(set.front()); }};
   RunLog log_;
+  Feasibility feasibility_;
+  std::vector<std::string> warnings_;  ///< shown to the user
+  std::vector<std::string> report_;
 };
 
 TEST_F(TasksTest, MultipleRunsAreOneBatchAndComeBackToTheirModelValues) {
@@ -52,6 +65,49 @@ TEST_F(TasksTest, AScenarioValueWithoutALogarithmIsRefusedByRunAndParameter) {
             "Error: Invalid parameter transformation for parameter c\n"
             "Scenario run 2 has the value 0, which has no logarithm.");
   EXPECT_TRUE(evaluator_.batches.empty());
+}
+
+TEST_F(TasksTest, MoreSetsThatCannotBeRunThanMayFailAreToldBeforeTheFirstModelRun) {
+  feasibility_ = Feasibility([](std::span<const double> set) -> std::optional<std::string> {
+    return set[0] < 5.0 ? std::nullopt : std::optional<std::string>("constraint 1 (a < 5)");
+  });
+  ScenarioTask scenarios;
+  scenarios.settings.type = ScenarioType::multipleRuns;
+  for (int i = 0; i < 30; ++i) scenarios.settings.runs.push_back({{i < 27 ? 1.0 : 6.0, 1.0, 1.0, 1.0}});
+  run(scenarios);
+  EXPECT_THAT(warnings_, IsEmpty()) << "three of 30 may fail";
+  for (int i = 0; i < 23; ++i) scenarios.settings.runs[static_cast<std::size_t>(i)].values[0] = 7.0;
+  evaluator_.batches.clear();
+  run(scenarios);
+  EXPECT_THAT(
+      warnings_,
+      ElementsAre("Constraints are violated by 26 of 30 scenarios, which are not run and fail: No. 1, 2, 3, 4, 5, "
+                  "6, 7, 8, 9, 10, 11, 12, 13, 14, 15, 16, 17, 18, 19, 20 and 6 more\n"
+                  "   No. 1: constraint 1 (a < 5)\n"
+                  "   The run will end before it is complete: at most 3 may fail, a tenth of the 30 planned"));
+
+  UncertaintyTask uncertainty;
+  uncertainty.settings = {SamplingType::simpleRandom, 50, {{4.0, 2.0}, {0.0, 1.0}, {2.0, 1.0}}};
+  evaluator_.batches.clear();
+  run(uncertainty);
+  ASSERT_EQ(warnings_.size(), 2U);
+  EXPECT_THAT(warnings_[1], AllOf(HasSubstr(" of 50 sets of the sample, "), HasSubstr("Redraw_Infeasible = 1")));
+  uncertainty.settings.redrawsInfeasible = true;
+  evaluator_.batches.clear();
+  run(uncertainty);
+  EXPECT_EQ(warnings_.size(), 2U);
+  for (const ParameterSet& set : evaluator_.batches.at(0)) EXPECT_TRUE(feasibility_.holds(set));
+  EXPECT_THAT(report_.at(1), ::testing::MatchesRegex("Redraw_Infeasible: 50 sets that can be run out of [0-9]+ drawn, "
+                                                     "an acceptance rate of [0-9.]+ %"));
+
+  OptimisationTask optimisation;  // from initial values that violate it
+  space_.initial[0] = 9.0;
+  optimisation.method = searchMethods().make(SetupValue(2));
+  optimisation.stopping = {.maxEvaluations = 9, .minChange = 0.0};
+  evaluator_.batches.clear();
+  run(optimisation);
+  ASSERT_EQ(warnings_.size(), 3U);
+  EXPECT_THAT(warnings_[2], StartsWith("Constraints are violated by 1 of 1 given sets of the initial sample, "));
 }
 
 TEST_F(TasksTest, AnUnknownUseOfASurrogateModelRunsNothingAndEndsNormally) {

@@ -1,0 +1,45 @@
+#include "run/tasks/infeasible_sets.h"
+
+#include <fmt/format.h>
+
+#include "evaluation/failed_run_policy.h"
+
+namespace mirevo {
+namespace {
+
+constexpr std::size_t kMostNumbers = 20;  // in the warning
+
+}  // namespace
+
+void warnOfInfeasibleSets(const TaskContext& context, std::span<const ParameterSet> sets, std::string_view what,
+                          int planned, std::string_view remedy) {
+  if (!context.feasibility.isTested()) return;
+  std::string numbers;
+  std::string first;
+  std::size_t count = 0;
+  for (std::size_t i = 0; i < sets.size(); ++i) {
+    const std::optional<std::string> violation = context.feasibility.violation(sets[i]);
+    if (!violation) continue;
+    if (count == 0) first = fmt::format("No. {}: {}", i + 1, *violation);
+    if (count < kMostNumbers) numbers += fmt::format("{}{}", count == 0 ? "" : ", ", i + 1);
+    ++count;
+  }
+  if (count == 0) return;
+  if (count > kMostNumbers) numbers += fmt::format(" and {} more", count - kMostNumbers);
+  std::string text = fmt::format("Constraints are violated by {} of {} {}, which are not run and fail: No. {}\n   {}",
+                                 count, sets.size(), what, numbers, first);
+  const int limit = FailedRunPolicy(planned).limit();
+  const bool endsRun = count > static_cast<std::size_t>(limit);
+  if (endsRun) {
+    text += fmt::format("\n   The run will end before it is complete: at most {} may fail, a tenth of the {} planned",
+                        limit, planned);
+    if (!remedy.empty()) text.append("\n   ").append(remedy);
+  }
+  if (endsRun && context.warnUser) {
+    context.warnUser(text);
+  } else {
+    context.log.warning(text);
+  }
+}
+
+}  // namespace mirevo

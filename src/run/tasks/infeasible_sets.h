@@ -1,0 +1,17 @@
+#pragma once
+
+#include <span>
+#include <string_view>
+
+#include "common/parameter_set.h"
+#include "run/tasks/task.h"
+
+namespace mirevo {
+
+/// Warns, before the first model run, of sets that will be evaluated although they cannot be run, with their numbers.
+/// If more of them than may fail are among `planned` evaluations, the user is told, too. `sets` are the first
+/// evaluations of the run, `what` they are called: "scenarios". `remedy` is one more sentence for the user, or empty.
+void warnOfInfeasibleSets(const TaskContext& context, std::span<const ParameterSet> sets, std::string_view what,
+                          int planned, std::string_view remedy = {});
+
+}  // namespace mirevo
