@@ -80,6 +80,10 @@ void EvaluationLedger::warnOfUnusedObservations(const EvaluationResult& result) 
 
 std::vector<EvaluationResult> EvaluationLedger::end() {
   if (const auto text = equalMeasures_.findIn(sets_, results_, isFinalRun_)) observer_.warning(*text);
+  return close();
+}
+
+std::vector<EvaluationResult> EvaluationLedger::close() {
   evaluationCount_ += static_cast<int>(sets_.size());
   sets_ = {};
   isFinished_.clear();
@@ -95,7 +99,7 @@ UnfinishedBatch EvaluationLedger::takeUnfinished() {
     unfinished.sets.push_back(std::move(sets_[place]));
     unfinished.results.push_back(std::move(results_[place]));
   }
-  end();
+  close();
   return unfinished;
 }
 

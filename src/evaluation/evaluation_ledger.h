@@ -58,6 +58,7 @@ class EvaluationLedger final {
   void warnOfUnusedObservations(const EvaluationResult& result);
   void replay(std::size_t place, EvaluationResult result);
   void store(std::size_t place, EvaluationResult result);
+  std::vector<EvaluationResult> close();
 
   EvaluationObserver& observer_;
   FailedRunPolicy& failedRuns_;

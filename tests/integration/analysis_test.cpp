@@ -429,7 +429,7 @@ TEST(UnfinishedAnalysis, AnUncertaintyAnalysisHasTheStatisticsOfWhatSucceededUnt
   EXPECT_EQ(cellOf(quantiles, {"measure", "flow"}, "Count"), count);
   EXPECT_NEAR(cellOf(quantiles, {"measure", "flow"}, "Mean"), sum / count, 1e-9);
   EXPECT_EQ(cellOf(quantiles, {"parameter", "a"}, "Count"), rows.size());
-  EXPECT_THAT(folder.read("basin.log"), HasSubstr("failed model runs are described in calSimErr.dat\n"));
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("failed evaluations are described in calSimErr.dat\n"));
   EXPECT_THAT(folder.read("basin_Run.dat"), HasSubstr(fmt::format("\nanalysedEvaluations\t{}\n", count)));
 
   folder.write("sound", "");

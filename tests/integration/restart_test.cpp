@@ -157,7 +157,7 @@ TEST_F(Restart, FailuresThatEndedARunAreMadeAgainWhenAsked) {
   const std::string why =
       "   4 x batch ran too long; first No. 1: run.sh was ended because it ran longer than 0.1 seconds\n";
   EXPECT_THAT(log(), HasSubstr("Why evaluations failed:\n" + why + "\nfailed evaluations: 4; at most 3 may fail"));
-  EXPECT_THAT(log(), EndsWith("\nfailed model runs are described in calSimErr.dat\n\n"
+  EXPECT_THAT(log(), EndsWith("\nfailed evaluations are described in calSimErr.dat\n\n"
                               "Error: Unable to continue. No of failed simulations too high.\n"));
   for (const int number : {1, 2, 3, 4}) {
     EXPECT_EQ(folder_.exists(fmt::format("basin_Failed{}/mirevo_batch.log", number)), number < 4) << number;

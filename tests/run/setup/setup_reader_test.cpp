@@ -224,7 +224,7 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatAreSeldomMeant)
        "this item"},
       {"Parameter_Name = 'Rate' => Parameter_Name = 'Rate'\nParameter_Equation = 'Depth * 2'",
        "setup.kdx:38:22: Parameter_Equation: not used, as only Parameter_Type = 2 makes a parameter dependent"},
-      {"ParamFileName => FileType = 1\nParamFileName & Parameter_Name = 'Rate' => Parameter_Name = "
+      {"'model/soil.tpl' => 'model/blank.tpl'\nFileType = 1 & Parameter_Name = 'Rate' => Parameter_Name = "
        "'Rate'\nParameter_IDValue = 1.5004E-35",
        "setup.kdx:46:27: Parameter_IDValue: taken for that of parameter \"Rate\", 1.5004e-35: ID values must differ by "
        "1e-37 or more"},
