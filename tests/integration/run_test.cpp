@@ -126,25 +126,6 @@ TEST(Scenarios, ASingleRunEvaluatesTheInitialSet) {
   EXPECT_NEAR(number(rows[0][4]), 1.224418, 1e-5);
 }
 
-TEST(FailedRuns, AValueThatNoFieldCanHoldIsAFailedRunWithoutTheModel) {
-  const ModelFolder folder;
-  folder.useScript("echo run >>'" + folder / "runs'");
-  std::vector<std::string> values = scenarios(10);
-  values[3] = "-1e120, 1, 1";
-  const std::string setup = folder.writeSetup({.option = 0, .scenarios = values});
-  folder.editSetup("Lower_Bound = 0.0", "Lower_Bound = -1e200");
-  const ProgramResult run = runProgram({setup});
-  ASSERT_EQ(run.exitCode, 0) << run.error;
-  const auto rows = readDataTable(folder.read("basin.dat")).rows;
-  EXPECT_THAT(std::vector(rows[3].begin(), rows[3].begin() + 3), ElementsAre("4", "FAILED", "-1e+120"));
-  EXPECT_EQ(std::ranges::count(folder.read("runs"), '\n'), 9);
-  const auto failures = readDataTable(folder.read("basin_Failures.dat")).rows;
-  ASSERT_EQ(failures.size(), 1U);
-  EXPECT_EQ(failures[0][1], "valueNotWritable");
-  EXPECT_EQ(failures[0][2], "the value -1e+120 of parameter \"a\" cannot be written in its field, " +
-                                folder / "model/parameters.tpl:2");
-}
-
 /// What it writes to its standard outputs must not get into the files that it opens.
 TEST(FailedRuns, ARunWithItsStandardOutputsClosedLeavesTheSameResults) {
   const ModelFolder folder;
