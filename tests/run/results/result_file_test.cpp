@@ -43,6 +43,7 @@ class ResultFileTest : public ::testing::Test {
   TemporaryFolder folder_;
   std::string path_ = (folder_ / "r.dat");
   ResultFile results_;
+  std::string reason_;
 };
 
 TEST_F(ResultFileTest, EveryRowIsOnDiskAtOnceAndReadsBackExactly) {
@@ -59,9 +60,8 @@ TEST_F(ResultFileTest, RowsEndUpInTheOrderOfTheirNumbers) {
   for (const std::vector<int>& arrival : {std::vector{1, 2, 3}, {3, 1, 2}, {2, 3, 1}, std::vector<int>{}}) {
     open();
     for (const int number : arrival) add(success(number, number, number), number);
-    std::string reason;
     const std::vector<std::string> closing{"done", "Best evaluation: 1"};
-    ASSERT_TRUE(results_.finish(closing, reason)) << reason;
+    ASSERT_TRUE(results_.finish(closing, reason_)) << reason_;
     std::string expected(kHeadText);
     if (!arrival.empty()) expected += "1\tOK\t1\t1\t1\t1\n2\tOK\t2\t2\t2\t2\n3\tOK\t3\t3\t3\t3\n";
     EXPECT_EQ(folder_.read("r.dat"), expected + "# done\n# Best evaluation: 1\n");
@@ -74,9 +74,8 @@ TEST_F(ResultFileTest, RowsStayWhereTheyAreWhenTheyCannotBePutInOrder) {
   open();
   add(success(2, 2, 2), 2);
   add(success(1, 1, 1), 1);
-  std::string reason;
-  EXPECT_FALSE(results_.finish(std::vector<std::string>{"done"}, reason));
-  EXPECT_EQ(reason, "Is a directory");
+  EXPECT_FALSE(results_.finish(std::vector<std::string>{"done"}, reason_));
+  EXPECT_EQ(reason_, "Is a directory");
   EXPECT_TRUE(folder_.read("r.dat").ends_with("2\tOK\t2\t2\t2\t2\n1\tOK\t1\t1\t1\t1\n# done\n"));
 }
 
@@ -84,8 +83,7 @@ TEST_F(ResultFileTest, AFullDiskIsReportedOnceWithItsReason) {
   std::filesystem::create_symlink("/dev/full", path_);
   EXPECT_EQ(refusalOf([this] { open(); }), "Error: Unable to write to " + path_ + "\nNo space left on device");
   add(success(1, 1, 1), 1);
-  std::string reason;
-  EXPECT_FALSE(results_.finish({}, reason));
+  EXPECT_FALSE(results_.finish({}, reason_));
 }
 
 TEST(KeepEarlierFile, NumbersWithoutOverwriting) {
