@@ -54,7 +54,7 @@ int bindSocket(const std::string& path, int number) {
   if (::stat(path.substr(0, nameStart).c_str(), &folder) != 0) return -1;
   sockaddr_un address{};
   address.sun_family = AF_UNIX;
-  // The leading zero byte stands for "without a file".
+  // The leading zero byte means "without a file".
   const auto end = fmt::format_to_n(address.sun_path + 1, sizeof address.sun_path - 1, "mirevo-{:x}-{:x}-{:x}-{}",
                                     folder.st_dev, folder.st_ino, checksumOf(path.substr(nameStart)), number);
   Descriptor made(::socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0));
@@ -145,7 +145,7 @@ void FileLock::leaveName() const {
   static_cast<void>(::pwrite(descriptor_, name.data(), name.size(), 0) == 0);  // without it the message says less
 }
 
-void FileLock::registerForSignals() {
+void FileLock::registerForSignals() const {
   for (auto& entry : heldLocks) {
     const FileLock* none = nullptr;
     if (entry.compare_exchange_strong(none, this)) return;

@@ -46,7 +46,7 @@ class FileLock final {
   bool takeSocket(Range range, int error, double deadline);
   void leaveName() const;
   void removeFile() const noexcept;
-  void registerForSignals();
+  void registerForSignals() const;
 
   std::string path_;
   int descriptor_ = -1;

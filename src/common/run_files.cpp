@@ -59,19 +59,23 @@ bool isNumber(std::string_view name) {
 /// Whether a run has made the folder.
 bool isFolderOfRun(const std::string& path, const RunFile& file, std::string& fault) {
   bool isEmpty = true;
-  bool areNumbers = true;
+  bool hasNumber = false;
   std::error_code failed;
   std::filesystem::directory_iterator entry(path, failed);
   for (; !failed && entry != std::filesystem::directory_iterator(); entry.increment(failed)) {
-    isEmpty = false;
-    areNumbers = areNumbers && isNumber(entry->path().filename().string());
+    const std::string name = entry->path().filename().string();
+    isEmpty = isEmpty && name.starts_with(".");  // a hidden file is that of a file manager or file system
+    hasNumber = hasNumber || isNumber(name);
   }
   if (failed) fault = failed.message();
-  if (failed || isEmpty || file == run_files::kSavedFolder) return areNumbers;
-  const std::string log = path + "/" + run_files::kBatchLog;
-  const bool isThere = std::filesystem::exists(log, failed);
-  if (failed) fault = fmt::format("{}: {}", log, failed.message());
-  return isThere;
+  if (failed || isEmpty) return isEmpty;
+  if (file == run_files::kSavedFolder) return hasNumber;
+  for (const char* mark : {run_files::kFolderMark, run_files::kBatchLog}) {  // the log alone in older versions
+    const std::string found = fmt::format("{}/{}", path, mark);
+    if (std::filesystem::exists(found, failed)) return true;
+    if (failed) fault = fmt::format("{}: {}", found, failed.message());
+  }
+  return false;
 }
 
 std::string unreadable(const std::string& reason) {

@@ -92,8 +92,9 @@ inline constexpr RunFile kFailedRuns{"calSimErr", ".dat", false, false, "# Faile
 inline constexpr RunFile kFailedRunsLock{"calSimErr", "._lock_", false, false, ""};
 inline constexpr RunFile kOwnFailedRuns{"_calSimErr", ".dat", false, false, "# Failed evaluations of "};
 
-/// The file in a process folder that receives the output of its batch; every process folder has one, and every copy of
-/// one.
+/// An empty file by which a process folder, or a copy of one, is known. A model that removes its logs leaves it.
+inline constexpr char kFolderMark[] = ".mirevo_process";
+/// The file in a process folder that receives the output of its batch.
 inline constexpr char kBatchLog[] = "mirevo_batch.log";
 
 }  // namespace run_files
@@ -111,7 +112,7 @@ std::string pathBeside(std::string_view prefix, const RunFile& file);
 bool carriesMark(const std::string& path, const RunFile& file);
 /// Why a run must not rename, replace or remove what is at `path`, as a sentence with the remedy. Empty where it may:
 /// there is nothing, a device, a file that carries the mark or has no more than a part of the head; for the folders of
-/// runs, one that is empty or holds what only theirs do.
+/// runs, one that is empty or holds what only theirs do, hidden files aside.
 std::string whyNotReplaceable(const std::string& path, const RunFile& file);
 /// Throws FatalError, with `path` and that sentence, unless it may be replaced.
 void requireReplaceable(const std::string& path, const RunFile& file);

@@ -32,10 +32,10 @@ struct EvaluationFailure {
   std::string reason;                   ///< one line for a person
   std::vector<std::string> lastOutput;  ///< the last lines that the batch printed
 
+  /// Whether the set violates a constraint, or has no finite value in one or in an equation.
+  bool isOfConstraints() const { return kind == Kind::constraintsViolated || kind == Kind::equationNotFinite; }
   /// Whether the model was run, or should have been: its folder may then tell more.
-  bool isOfModelRun() const {
-    return kind != Kind::constraintsViolated && kind != Kind::equationNotFinite && kind != Kind::valueNotWritable;
-  }
+  bool isOfModelRun() const { return !isOfConstraints() && kind != Kind::valueNotWritable; }
 };
 
 /// The name of a kind of failure for people, "batch ran too long".

@@ -9,7 +9,7 @@ namespace mirevo {
 void FailedRunPolicy::countFailure(int number, const EvaluationFailure& failure) {
   if (isFolderWanted(failure)) --foldersLeft_;
   ++failedCount_;
-  if (!failure.isOfModelRun()) ++notRunCount_;
+  if (failure.isOfConstraints()) ++notRunCount_;
   if (failedCount_ <= limit_) return;
   const std::string notRun =
       notRunCount_ == 0 ? "" : fmt::format(", {} of them not run as they violate the constraints", notRunCount_);

@@ -467,9 +467,9 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
                              fileNameOf(results_->failedRuns().paths().forPeople));
     }
     if (!details.empty()) explained += "\n" + details;
-    showMessage(explained);
     statistics = keepStatistics();
     endLogInError(text, details);
+    showMessage(explained);
   }
   closeResultsOfEarlyEnd({RunStage::failed, std::string(message), explained}, statistics);
   if (launcher_) launcher_->haltProcesses();  // before the report, which takes time

@@ -1,10 +1,14 @@
 #pragma once
 
 #include <functional>
+#include <optional>
+#include <span>
+#include <string>
 #include <utility>
 #include <vector>
 
 #include "evaluation/evaluator.h"
+#include "parameters/feasibility.h"
 
 namespace mirevo {
 
@@ -46,6 +50,12 @@ inline EvaluationResult failedResult() {
   EvaluationResult result = resultOf(kFailedRunValue);
   result.failure.emplace();
   return result;
+}
+
+/// Only sets that meet the condition can be run.
+template <typename Condition>
+Feasibility feasibleWhere(Condition isMet, const std::string& reason) {
+  return Feasibility([=](std::span<const double> set) { return isMet(set) ? std::nullopt : std::optional(reason); });
 }
 
 }  // namespace mirevo

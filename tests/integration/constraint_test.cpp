@@ -9,13 +9,12 @@ namespace mirevo::testing {
 namespace {
 
 /// The test model with a constraint that cuts off the best set, a = 5 and b = 2; the initial values meet it. Runs it.
-ProgramResult runConstrained(const ModelFolder& folder, const RunSettings& settings, const std::string& limit = "6.9",
-                             bool redraws = false) {
+ProgramResult runConstrained(const ModelFolder& folder, const RunSettings& settings, bool redraws = false) {
   const std::string setup = folder.writeSetup(settings);
-  folder.editSetup("TqSEKdxListItemCount = 0\n    [/INTERNAL_CONSTRAINTS]",
-                   "TqSEKdxListItemCount = 1\n      [CONSTRAINT_1]\n        Left_Equation = 'a + b'\n        "
-                   "Right_Equation = '" +
-                       limit + "'\n        Logical_Operator = 1\n      [/CONSTRAINT_1]\n    [/INTERNAL_CONSTRAINTS]");
+  folder.editSetup(
+      "TqSEKdxListItemCount = 0\n    [/INTERNAL_CONSTRAINTS]",
+      "TqSEKdxListItemCount = 1\n      [CONSTRAINT_1]\n        Left_Equation = 'a + b'\n        "
+      "Right_Equation = '6.9'\n        Logical_Operator = 1\n      [/CONSTRAINT_1]\n    [/INTERNAL_CONSTRAINTS]");
   if (redraws)
     folder.editSetup("    Uncertainty_Type = 1\n", "    Uncertainty_Type = 1\n    Redraw_Infeasible = 'yes'\n");
   return runProgram({setup});
@@ -23,10 +22,11 @@ ProgramResult runConstrained(const ModelFolder& folder, const RunSettings& setti
 
 TEST(Constraints, NearTheOptimumCostASearchNoEvaluation) {
   const ModelFolder folder;
-  for (const RunSettings& settings :
-       {RunSettings{.algorithm = 0, .maxEvaluations = 150}, RunSettings{.algorithm = 1, .maxEvaluations = 150},
-        RunSettings{.algorithm = 0, .usesSurrogate = true, .maxEvaluations = 150},
-        RunSettings{.algorithm = 2, .includesInitial = false, .maxEvaluations = 150}}) {
+  for (const int algorithm : {0, 1, 2}) {
+    const RunSettings settings{.algorithm = algorithm,
+                               .usesSurrogate = algorithm == 0,
+                               .includesInitial = algorithm != 2,
+                               .maxEvaluations = 150};
     const ProgramResult run = runConstrained(folder, settings);
     ASSERT_EQ(run.exitCode, 0) << run.error;
     const std::string log = folder.read("basin.log");
@@ -37,17 +37,13 @@ TEST(Constraints, NearTheOptimumCostASearchNoEvaluation) {
       EXPECT_LE(std::stod(row[2]) + std::stod(row[3]), 6.9);
       best = std::min(best, std::stod(row[6]));
     }
-    EXPECT_LT(best, 0.2) << settings.algorithm;
+    EXPECT_LT(best, 0.2) << algorithm;
   }
-  const ProgramResult none = runConstrained(folder, {.algorithm = 0}, "-1");
-  EXPECT_EQ(none.exitCode, 1);
-  EXPECT_THAT(none.error, HasSubstr("Error: No parameter set found that satisfies the constraints\n"));
-  EXPECT_THAT(folder.read("basin.log"), Not(HasSubstr("Evaluation of parameter set No. 1 ")));
 }
 
 TEST(Constraints, TellOfASampleOfWhichTooManySetsViolateThemBeforeTheFirstRunAndAreMetByOneDrawnAgain) {
   const ModelFolder folder;
-  RunSettings settings{.option = 3, .maxEvaluations = 60};  // of a + b about 7
+  const RunSettings settings{.option = 3, .maxEvaluations = 60};  // of a + b about 7
   ProgramResult run = runConstrained(folder, settings);
   EXPECT_EQ(run.exitCode, 1);
   EXPECT_THAT(run.error, AllOf(HasSubstr(" of 60 sets of the sample, which are not run and fail: No. "),
@@ -59,7 +55,7 @@ TEST(Constraints, TellOfASampleOfWhichTooManySetsViolateThemBeforeTheFirstRunAnd
                     Not(HasSubstr("model run error")), Not(HasSubstr("failed model run"))));
   EXPECT_THAT(folder.read("calSimErr.dat"), HasSubstr(" (parameter constraints violated)\n"));
 
-  run = runConstrained(folder, settings, "6.9", true);
+  run = runConstrained(folder, settings, true);
   EXPECT_EQ(run.exitCode, 0);
   EXPECT_EQ(run.error, "");
   const std::string results = folder.read("basin.dat");
@@ -68,13 +64,6 @@ TEST(Constraints, TellOfASampleOfWhichTooManySetsViolateThemBeforeTheFirstRunAnd
   EXPECT_THAT(results, HasSubstr("\n# " + acceptance));
   log = folder.read("basin.log");
   EXPECT_LT(log.find(acceptance), log.find("Evaluation of parameter set No. 1 "));
-
-  settings = {.option = 0, .scenarios = {"1, 1, 1", "6, 1, 1", "9, 4, 1"}};
-  run = runConstrained(folder, settings);
-  EXPECT_EQ(run.exitCode, 1);
-  EXPECT_THAT(run.error,
-              HasSubstr("Constraints are violated by 2 of 3 scenarios, which are not run and fail: No. 2, 3\n   "
-                        "No. 2: constraint 1 (a + b <= 6.9): left side 7, right side 6.9\n"));
 }
 
 }  // namespace

@@ -50,12 +50,6 @@ TEST_F(Interruption, ASignalOrAKillFileEndsTheRunWithItsMessageAndNothingIsLeft)
 TEST_F(Interruption, ASecondRunOfTheSameFilesOrFoldersIsRefused) {
   folder_.write("other/x", "");
   folder_.editSetup("ProcessFolder = ''", fmt::format("ProcessFolder = '{}'", folder_ / "other"));
-  const auto processFolder = [&] {
-    for (const auto& entry : std::filesystem::directory_iterator(folder_ / "other")) {
-      if (entry.path().string().ends_with("_Process1")) return entry.path().string();
-    }
-    return std::string();
-  };
   RunningProgram program({setup_});
   ASSERT_TRUE(waitUntil([&] { return folder_.read("basin.log").ends_with("No. 2 initiated\n"); }));
   const std::string log = folder_.read("basin.log");
@@ -72,7 +66,7 @@ TEST_F(Interruption, ASecondRunOfTheSameFilesOrFoldersIsRefused) {
   EXPECT_FALSE(folder_.exists("basin.1.log"));
 
   // Another setup whose process folders have the same names.
-  const std::string first = processFolder();
+  const std::string first = folder_ / folder_.processFolder("other", 1);
   folder_.editSetup(fmt::format("ProcessFolder = '{}'", folder_ / "other"), "ProcessFolder = ''");
   std::string text = folder_.read("basin.kdx");
   for (const char* file : {"model/", "observed.csv"}) {

@@ -68,6 +68,14 @@ class ModelFolder : public TemporaryFolder {
     const std::string records = read("basin._spi_");
     return std::atoi(records.c_str() + records.find(", process ") + 10);
   }
+  /// The process folder with that number in a folder, relative to this one; empty when there is none.
+  std::string processFolder(const std::string& parent, int number) const {
+    for (const auto& entry : std::filesystem::directory_iterator(*this / parent)) {
+      const std::string name = entry.path().filename().string();
+      if (name.starts_with("basin") && name.ends_with(fmt::format("_Process{}", number))) return parent + "/" + name;
+    }
+    return {};
+  }
   /// The model's script, with `lines` before the model proper.
   void useScript(const std::string& lines) const {
     write("model/run.sh", fmt::format("#!/bin/sh\n{}\nexec {} \"$@\"\n", lines, MIREVO_TEST_MODEL), 0755);
@@ -113,6 +121,12 @@ class ModelFolder : public TemporaryFolder {
 /// A line of a model script that takes 0 to 30 ms, told by the parameter values alone: model runs side by side end in
 /// another order than they began.
 inline constexpr const char* kSleepByParameters = "sleep 0.0$(($(cksum <parameters.txt | cut -d ' ' -f 1) % 4))";
+
+inline int occurrences(const std::string& text, const std::string& wanted) {
+  int count = 0;
+  for (auto at = text.find(wanted); at != std::string::npos; at = text.find(wanted, at + 1)) ++count;
+  return count;
+}
 
 /// Everything in a result file but when the run was started and ended.
 inline std::string withoutDates(const std::string& results) {

@@ -15,12 +15,6 @@ namespace {
 /// A model that uses MPI itself must not take itself for a process of this job.
 constexpr char kCountsJobVariables[] = "env | grep -cE '^(OMPI|PMIX|PMI)_' > job_variables.txt";
 
-int occurrences(const std::string& text, const std::string& wanted) {
-  int count = 0;
-  for (auto at = text.find(wanted); at != std::string::npos; at = text.find(wanted, at + 1)) ++count;
-  return count;
-}
-
 class Mpi : public ::testing::Test {
  protected:
   void SetUp() override {
@@ -30,14 +24,8 @@ class Mpi : public ::testing::Test {
   static ProgramResult runJob(int processes, const std::vector<std::string>& arguments) {
     return startJob(processes, arguments).wait();
   }
-  /// The process folder with that number, relative to the test's; empty when there is none.
   std::string processFolder(const RunSettings& settings, int number) const {
-    const std::string parent = settings.processFolder.empty() ? "." : settings.processFolder;
-    for (const auto& entry : std::filesystem::directory_iterator((folder_ / parent))) {
-      const std::string name = entry.path().filename().string();
-      if (name.starts_with("basin") && name.ends_with(fmt::format("_Process{}", number))) return parent + "/" + name;
-    }
-    return {};
+    return folder_.processFolder(settings.processFolder.empty() ? "." : settings.processFolder, number);
   }
   std::string log() const { return folder_.read("basin.log"); }
 
@@ -106,7 +94,7 @@ TEST_F(Mpi, ASetupBesideItsModelIsRunByManyRanks) {
       for (const auto& entry : std::filesystem::directory_iterator(folder_ / processFolder(settings, rank))) {
         names.insert(entry.path().filename());
       }
-      for (const char* ofThisRun : {"mirevo_batch.log", "scratch"}) names.erase(ofThisRun);
+      for (const char* ofThisRun : {".mirevo_process", "mirevo_batch.log", "scratch"}) names.erase(ofThisRun);
       EXPECT_THAT(names, ElementsAre("basin.kdx", "basin.txt", "maps", "model", "observed.csv", "run.sh"));
     }
   }

@@ -26,8 +26,8 @@ class ViewerTest : public ::testing::Test {
     folder_.write("basin.kdx", "");
     folder_.write("basin._spi_", runningRun() + furtherRecords);
   }
-  static void cancelAndConfirm(TerminalProgram& viewer) {
-    viewer.type("q");
+  static void cancelAndConfirm(TerminalProgram& viewer, const char* key = "q") {
+    viewer.type(key);
     ASSERT_TRUE(viewer.shows("Cancel the run?"));
     viewer.type("y");
   }
@@ -127,16 +127,6 @@ TEST_F(ViewerTest, ARunOutlivesItsViewerUntouched) {
   }
 }
 
-TEST_F(ViewerTest, ControlCAsksUnderTheViewerAndYesCancels) {
-  TerminalProgram viewer({MIREVO_PROGRAM, "//qmon", folder_.writeSetup(slowRun())});
-  ASSERT_TRUE(viewer.shows("of 2001"));
-  viewer.type("\x03");
-  ASSERT_TRUE(viewer.shows("Cancel the run?"));
-  viewer.type("y");
-  EXPECT_EQ(viewer.wait(), 1);
-  EXPECT_THAT(viewer.output(), HasSubstr("Simulation cancelled"));
-}
-
 /// A run whose lock is held by another one of the setup is starting for some seconds. It is stopped as soon as it waits
 /// for the lock, so that its patience does not end while the keys are typed.
 TEST_F(ViewerTest, CancellingARunThatIsOnlyStartingLeavesAnotherRunAlone) {
@@ -155,7 +145,7 @@ TEST_F(ViewerTest, CancellingARunThatIsOnlyStartingLeavesAnotherRunAlone) {
   }));
   ::kill(run, SIGSTOP);
   ASSERT_TRUE(viewer.shows("The run is starting."));
-  cancelAndConfirm(viewer);
+  cancelAndConfirm(viewer, "\x03");  // Ctrl-C, which asks as well
   ::kill(run, SIGCONT);
   EXPECT_EQ(viewer.wait(), 128 + SIGTERM);
   EXPECT_THAT(viewer.output(), HasSubstr("Mirevo: Termination request"));

@@ -122,16 +122,13 @@ TEST(ParameterModel, OrdersAsStepByStep) {
 
 TEST(CheckConstraint, FollowsItsTable) {
   //                              operator: 0      1      2      3      4      -1
-  const struct {
-    double left, right;
-    bool violated[6];
-  } cases[] = {{1, 2, {false, false, true, true, false, false}},
-               {2, 2, {true, false, true, false, false, false}},
-               {3, 2, {true, true, false, false, false, false}}};
-  for (const auto& c : cases) {
+  const std::tuple<double, double, std::vector<bool>> cases[] = {{1, 2, {false, false, true, true, false, false}},
+                                                                 {2, 2, {true, false, true, false, false, false}},
+                                                                 {3, 2, {true, true, false, false, false, false}}};
+  for (const auto& [left, right, violated] : cases) {
     for (int i = 0; i < 6; ++i) {
       const auto logicalOperator = static_cast<LogicalOperator>(i == 5 ? -1 : i);
-      EXPECT_EQ(CheckConstraint(c.left, c.right, logicalOperator), c.violated[i]) << c.left << " operator " << i;
+      EXPECT_EQ(CheckConstraint(left, right, logicalOperator), violated.at(i)) << left << " operator " << i;
     }
   }
 }

@@ -17,10 +17,7 @@ using ::testing::HasSubstr;
 using ::testing::Not;
 
 TEST(JsonWriter, TextsCannotLeaveTheirScriptElementAndAreUtf8) {
-  const struct {
-    std::string_view text;
-    const char* json;
-  } cases[] = {
+  const std::pair<std::string_view, const char*> cases[] = {
       {"</script><!--&", R"("\u003c/script\u003e\u003c!--\u0026")"},
       {"\"\\\n\t\x01", R"("\"\\\u000a\u0009\u0001")"},
       {"Müßig 流 \xF0\x9F\x8C\x8A", "\"Müßig 流 \xF0\x9F\x8C\x8A\""},
@@ -34,7 +31,7 @@ TEST(JsonWriter, TextsCannotLeaveTheirScriptElementAndAreUtf8) {
       {"x\xE2\x82", "\"x\uFFFD\uFFFD\""},                    // cut off
       {std::string_view("a\0b", 3), R"("a\u0000b")"},
   };
-  for (const auto& c : cases) EXPECT_EQ(JsonWriter().text(c.text).take(), c.json);
+  for (const auto& [text, json] : cases) EXPECT_EQ(JsonWriter().text(text).take(), json);
 }
 
 TEST(JsonWriter, NumbersThatAreNoneAreNullAndCommasComeBetweenValues) {

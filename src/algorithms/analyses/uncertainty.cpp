@@ -15,7 +15,7 @@ namespace mirevo {
 
 namespace {
 
-constexpr int kMostRedraws = 1'000'000;  // of one set
+constexpr std::int64_t kMostRedraws = 1'000'000;  // for the whole sample, and as many again for each thousand sets
 
 /// Replaces deviate i by a random value in the stratum (pi_i - 1, pi_i) / N, where pi_i is its rank among the deviates,
 /// from 1; ties by index.
@@ -143,17 +143,20 @@ FeasibleSample feasibleUncertaintySample(const UncertaintySettings& settings, st
   UncertaintySettings single = settings;
   single.samplingType = SamplingType::simpleRandom;
   single.sampleSize = 1;
+  const std::int64_t most = kMostRedraws + kMostRedraws / 1000 * sample.drawnCount;
+  std::int64_t redraws = 0;
+  std::size_t feasible = 0;
   for (ParameterSet& set : sample.sets) {
-    std::optional<std::string> violation = feasibility.violation(set);
-    for (int redraws = 0; violation; ++redraws) {
-      if (redraws == kMostRedraws) {
+    while (const auto violation = feasibility.violation(set)) {
+      if (redraws++ == most) {
         fatalError("Error: No parameter set found that satisfies the constraints",
-                   fmt::format("none of {} drawn one after the other; the last one: {}", redraws, *violation));
+                   fmt::format("{} of the {} sets wanted, of {} drawn; the last one: {}", feasible, sample.sets.size(),
+                               sample.drawnCount, *violation));
       }
       set = std::move(drawSample(single, random, messages).front());
       ++sample.drawnCount;
-      violation = feasibility.violation(set);
     }
+    ++feasible;
   }
   return sample;
 }

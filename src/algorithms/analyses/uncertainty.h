@@ -56,7 +56,8 @@ struct FeasibleSample {
 
 /// The uncertaintySample() whose sets that cannot be run are replaced by further ones: the stream goes on behind the
 /// sample, with one deviate for each parameter in setup order, whatever the type of sampling. Throws FatalError "Error:
-/// No parameter set found that satisfies the constraints" if none of a million drawn for one of them can be run.
+/// No parameter set found that satisfies the constraints" if a million draws, and a thousand more for each set, do not
+/// yield them.
 FeasibleSample feasibleUncertaintySample(const UncertaintySettings& settings, std::int32_t seed,
                                          const Feasibility& feasibility, const MessageSink& messages = {});
 

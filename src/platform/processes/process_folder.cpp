@@ -66,43 +66,9 @@ bool isFolder(const struct stat& status) {
   return S_ISDIR(status.st_mode);
 }
 
-bool isBatchLog(std::string_view name) {
-  return name == run_files::kBatchLog;
-}
-
-/// Removes a file, a link, or a folder with all its content, if there is one.
-void removeTree(const std::string& root) {
-  // Depth-first without recursion: each folder is visited once to push its entries and, after these, once to remove it.
-  struct Visit {
-    std::string path;
-    bool emptied;
-  };
-  std::vector<Visit> visits;
-  visits.push_back({root, false});
-  while (!visits.empty()) {
-    const Visit visit = visits.back();
-    visits.pop_back();
-    if (visit.emptied) {
-      if (::rmdir(visit.path.c_str()) != 0 && !hasVanished(errno)) fail("remove the folder", visit.path, errno);
-      continue;
-    }
-    const auto status = statusOf(visit.path);
-    if (!status) continue;
-    if (!isFolder(*status)) {
-      if (::unlink(visit.path.c_str()) != 0 && !hasVanished(errno)) fail("remove", visit.path, errno);
-      continue;
-    }
-    ::chmod(visit.path.c_str(), S_IRWXU);  // a model may have made it read-only; a failure is noticed below
-    visits.push_back({visit.path, true});
-    const auto names = namesIn(visit.path);
-    if (!names) continue;
-    // The root's batch log last: what an interruption leaves is still known for what it is.
-    for (const bool pushesLog : {true, false}) {
-      for (const std::string& name : *names) {
-        if ((visit.path == root && isBatchLog(name)) == pushesLog) visits.push_back({visit.path + "/" + name, false});
-      }
-    }
-  }
+/// Whether the entry of a process folder is not the model's.
+bool isOwn(std::string_view name) {
+  return name == run_files::kBatchLog || name == run_files::kFolderMark;
 }
 
 void copyTimes(int to, const struct stat& status) {
@@ -212,23 +178,23 @@ class FolderCopy final {
     }
     if (::mkdir(to.c_str(), S_IRWXU) != 0) fail("create the folder", to, errno);
     made_.push_back({to, status});
-    if (below.empty()) makeBatchLog(to);
+    if (below.empty()) makeMark(to);
     const bool holdsProcessFolders = processFolders_.liesIn(status);
     const RunMadeEntries runMade(from, *names);
     for (const std::string& name : *names) {
-      const bool isOwnLog = below.empty() && isBatchLog(name);
+      const bool isMark = below.empty() && isOwn(name);
       const bool isProcessFolder = holdsProcessFolders && processFolders_.contains(name);
-      if (isOwnLog || isProcessFolder || runMade.contains(name)) continue;
+      if (isMark || isProcessFolder || runMade.contains(name)) continue;
       std::string path = below;
       copyEntry(path.append("/").append(name));
     }
   }
 
   /// First of all, so that the folder is known for what it is, however the copying ends.
-  static void makeBatchLog(const std::string& folder) {
-    const std::string path = folder + "/" + run_files::kBatchLog;
-    const Descriptor log(::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0666));
-    if (log.get() < 0) fail("create", path, errno);
+  static void makeMark(const std::string& folder) {
+    const std::string path = folder + "/" + run_files::kFolderMark;
+    Descriptor mark(::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0666));
+    if (mark.get() < 0 || !mark.close()) fail("create", path, errno);
   }
 
   void copyEntry(const std::string& path) {
@@ -255,6 +221,40 @@ class FolderCopy final {
 };
 
 }  // namespace
+
+void removeTree(const std::string& root) {
+  // Depth-first without recursion: each folder is visited once to push its entries and, after these, once to remove it.
+  struct Visit {
+    std::string path;
+    bool emptied;
+  };
+  std::vector<Visit> visits;
+  visits.push_back({root, false});
+  while (!visits.empty()) {
+    const Visit visit = visits.back();
+    visits.pop_back();
+    if (visit.emptied) {
+      if (::rmdir(visit.path.c_str()) != 0 && !hasVanished(errno)) fail("remove the folder", visit.path, errno);
+      continue;
+    }
+    const auto status = statusOf(visit.path);
+    if (!status) continue;
+    if (!isFolder(*status)) {
+      if (::unlink(visit.path.c_str()) != 0 && !hasVanished(errno)) fail("remove", visit.path, errno);
+      continue;
+    }
+    ::chmod(visit.path.c_str(), S_IRWXU);  // a model may have made it read-only; a failure is noticed below
+    visits.push_back({visit.path, true});
+    const auto names = namesIn(visit.path);
+    if (!names) continue;
+    // The root's mark last: what an interruption leaves is still known for what it is.
+    for (const bool pushesOwn : {true, false}) {
+      for (const std::string& name : *names) {
+        if ((visit.path == root && isOwn(name)) == pushesOwn) visits.push_back({visit.path + "/" + name, false});
+      }
+    }
+  }
+}
 
 std::string processLockPath(std::string_view processFolderPrefix) {
   return std::string(processFolderPrefix).append(run_files::kProcessLock.extension);

@@ -10,10 +10,15 @@ std::string processLockPath(std::string_view processFolderPrefix);
 /// What to say when another run, `holder`, has locked one of them.
 std::string processFoldersInUse(std::string_view processFolderPrefix, std::string_view holder);
 
-/// Makes `target` a fresh copy of the folder `source`, with an empty batch log: an existing `target` is removed, unless
-/// it is not a process folder (whyNotReplaceable()); files (sharing blocks with the original if the file system can),
-/// folders and links are copied with their modes and times, sockets and devices are not. Both paths are absolute. A
-/// link to a target inside `source` leads into the copy, one to a target outside leads there as before.
+/// Removes a file, a link, or a folder with all its content, if there is one; the mark of a process folder last, so
+/// that it is known for what it is until it is gone. Throws FatalError with a line that names the path and the system's
+/// reason.
+void removeTree(const std::string& root);
+
+/// Makes `target` a fresh copy of the folder `source`, with a mark (run_files::kFolderMark): an existing `target` is
+/// removed, unless it is not a process folder (whyNotReplaceable()); files (sharing blocks with the original if the
+/// file system can), folders and links are copied with their modes and times, sockets and devices are not. Both paths
+/// are absolute. A link to a target inside `source` leads into the copy, one to a target outside leads there as before.
 ///
 /// What runs have made in `source` is left out (RunMadeEntries): the logs, results and saved files of setups beside the
 /// model; the process folders of this run, `processFolderPrefix` followed by a number, and those of other runs,

@@ -30,9 +30,12 @@ bool isProcessFolder(const std::string& path) {
   if (mark == std::string::npos) return false;
   std::string_view number = std::string_view(path).substr(mark + kMark.size());
   if (number == run_files::kProcessLock.extension) return true;
-  struct stat status {};
+  const auto holds = [&path](const char* name) {
+    struct stat status {};
+    return ::stat((path + "/" + name).c_str(), &status) == 0;
+  };
   return !takeDigits(number).empty() && number.empty() &&
-         ::stat((path + "/" + run_files::kBatchLog).c_str(), &status) == 0;
+         (holds(run_files::kFolderMark) || holds(run_files::kBatchLog));
 }
 
 }  // namespace

@@ -11,6 +11,7 @@
 #include "common/run_files.h"
 #include "common/text.h"
 #include "common/utf8.h"
+#include "platform/processes/process_folder.h"
 
 namespace mirevo {
 namespace {
@@ -119,9 +120,11 @@ std::vector<std::string> removeFailedRunFolders(const std::string& prefix, const
       problems.push_back(fmt::format("{} was not removed. {}", entry->path().string(), why));
       continue;
     }
-    std::error_code reason;
-    std::filesystem::remove_all(entry->path(), reason);
-    if (reason) problems.push_back(fmt::format("{} was not removed: {}", entry->path().string(), reason.message()));
+    try {
+      removeTree(entry->path().string());
+    } catch (const FatalError& error) {
+      problems.push_back(fmt::format("{} was not removed: {}", entry->path().string(), error.message()));
+    }
   }
   return problems;
 }

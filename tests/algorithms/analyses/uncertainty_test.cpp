@@ -6,6 +6,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "algorithms/analyses/sampled_distributions.h"
 #include "algorithms/function_evaluator.h"
 #include "algorithms/numbers/sample_summary.h"
 #include "algorithms/numbers/uniform_generator.h"
@@ -55,9 +56,7 @@ TEST(UncertaintySample, LatinHypercubeHitsEachStratumOnceInRankOrder) {
 
 TEST(UncertaintySample, DrawsOnlySetsThatCannotBeRunAgain) {
   const auto above = [](double limit) {
-    return Feasibility([limit](std::span<const double> set) -> std::optional<std::string> {
-      return set[0] > limit ? std::nullopt : std::optional<std::string>("too small");
-    });
+    return feasibleWhere([limit](const auto& set) { return set[0] > limit; }, "too small");
   };
   for (const SamplingType type : {SamplingType::simpleRandom, SamplingType::latinHypercube}) {
     const UncertaintySettings settings{type, 200, {{0.0, 1.0}, {3.0, 2.0}}};
@@ -106,6 +105,20 @@ TEST(UncertaintyAnalysis, EvaluatesOneBatchAndLeavesFailuresOut) {
           "   low                             2              1            1.1            1.5              2"
           "            2.5            2.9",
           "", "   Sample correlation              K", "   K                               1"));
+}
+
+TEST(UncertaintySummary, IsOfTheValuesThatTheModelGets) {
+  const SearchSpace space{.names = {"a", "b"},
+                          .lower = {0.0, 0.0},
+                          .upper = {std::log(2.5), 4.0},  // b is at most 3
+                          .transformation = {TransformationType::logarithmic, TransformationType::integer}};
+  const std::vector<ParameterSet> sample{{-0.1, 2.9}, {std::log(2.0), 1.2}, {std::log(3.0), 4.5}, {std::log(4.0), 3.1}};
+  const UncertaintySummary summary = summariseUncertainty({sample, {}}, space);
+  EXPECT_DOUBLE_EQ(summary.parameters[0].mean, (std::exp(-0.1) + 9.0) / 4.0);
+  EXPECT_EQ(summary.parameters[1].mean, 2.5);
+  const std::vector<std::vector<double>> got{{std::exp(-0.1), 2}, {2, 1}, {3, 4}, {4, 3}};
+  EXPECT_DOUBLE_EQ(summary.correlations[0][1], correlationMatrix(got)[0][1]);
+  EXPECT_EQ(setsOutsideBounds(sample, space), "Sets outside the bounds of a parameter: 3 of 4 (a in 3, b in 1)");
 }
 
 }  // namespace

@@ -4,10 +4,13 @@
 #include <cmath>
 #include <limits>
 
+#include <fmt/format.h>
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include "algorithms/analyses/series_band.h"
 #include "algorithms/numbers/uniform_generator.h"
+#include "matchers.h"
 
 namespace mirevo {
 namespace {
@@ -38,6 +41,21 @@ TEST(SampleCorrelation, MatchesAWorkedExampleAndRefusesConstants) {
   EXPECT_EQ(matrix[1][0], matrix[0][1]);
   EXPECT_TRUE(std::isnan(matrix[0][2]));
   EXPECT_EQ(matrix[2][2], 1.0);
+}
+
+TEST(SampleCorrelation, OfMoreThanTenColumnsIsToldByItsLargestPairs) {
+  std::vector<std::string> names;
+  for (int j = 1; j <= 11; ++j) names.push_back(fmt::format("p{}", j));
+  std::vector<std::vector<double>> matrix(11, std::vector<double>(11, 0.1));
+  EXPECT_EQ(formatCorrelation("Ten", std::span(names).first(10), std::span(matrix).first(10), "c.dat").size(), 11U);
+  matrix[2][6] = matrix[6][2] = 0.5;
+  matrix[3][10] = matrix[10][3] = -0.7;
+  const std::vector<std::string> lines = formatCorrelation("Sample correlation", names, matrix, "c.dat");
+  ASSERT_EQ(lines.size(), 12U);
+  EXPECT_THAT(lines[0], HasSubstr("Sample correlation        Largest"));
+  EXPECT_THAT(lines[1], AllOf(StartsWith("   p4, p11 "), HasSubstr(" -0.7")));
+  EXPECT_THAT(lines[2], AllOf(StartsWith("   p3, p7 "), HasSubstr(" 0.5")));
+  EXPECT_EQ(lines[11], "   All correlations of the 11 parameters are in c.dat");
 }
 
 TEST(SeriesBand, HasTheQuantilesOfWhatSucceededAndCountsTheObservationsInside) {

@@ -51,7 +51,7 @@ TEST(DdsSteps, NormalDeviateRejectsAndChooses) {
   EXPECT_DOUBLE_EQ(ddsNormalDeviate(scripted({0.75, 0.625, 0.5})), f * 0.25);
 }
 
-TEST(DdsSteps, CandidatePerturbsTheChosenParametersOnly) {
+TEST(DdsSteps, CandidatePerturbsTheChosenParametersOnlyUntilItCanBeRun) {
   const SearchBounds bounds = box(3, 0.0, 10.0);
   const std::vector<double> best = {5.0, 5.0, 5.0};
   const double f = std::sqrt(-2.0 * std::log(0.3125) / 0.3125);
@@ -65,16 +65,9 @@ TEST(DdsSteps, CandidatePerturbsTheChosenParametersOnly) {
         ddsCandidate(best, bounds, 0.2, 0.0, scripted({0.0, 0.0, 0.0, deviate, 0.75, 0.625, 0.1}), all);
     for (std::size_t j = 0; j < 3; ++j) EXPECT_EQ(candidate[j] != 5.0, j == index) << deviate << " " << j;
   }
-}
-
-TEST(DdsSteps, CandidateThatCannotBeRunIsPerturbedAgain) {
-  FeasiblePoints below(Feasibility([](std::span<const double> set) -> std::optional<std::string> {
-    return set[1] < 5.0 ? std::nullopt : std::optional<std::string>("too large");
-  }));
-  const double f = std::sqrt(-2.0 * std::log(0.3125) / 0.3125);
-  // The same parameter: first upwards, then by u = (-0.5, 0.25).
-  EXPECT_EQ(ddsCandidate(std::vector<double>{5, 5, 5}, box(3, 0.0, 10.0), 0.2, 0.3,
-                         scripted({0.3, 0.29, 0.9, 0.75, 0.625, 0.1, 0.25, 0.625, 0.1}), below),
+  // One that cannot be run is perturbed again in the same parameter: first upwards, then by u = (-0.5, 0.25).
+  FeasiblePoints below(feasibleWhere([](const auto& set) { return set[1] < 5.0; }, "too large"));
+  EXPECT_EQ(ddsCandidate(best, bounds, 0.2, 0.3, scripted({0.3, 0.29, 0.9, 0.75, 0.625, 0.1, 0.25, 0.625, 0.1}), below),
             (ParameterSet{5.0, 5.0 - 0.2 * 10.0 * (f * 0.5), 5.0}));
 }
 

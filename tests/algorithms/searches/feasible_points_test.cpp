@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <memory>
+#include <numeric>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -19,11 +20,8 @@ namespace {
 
 /// Sets whose sum is below the limit can be run.
 Feasibility sumBelow(double limit) {
-  return Feasibility([limit](std::span<const double> set) -> std::optional<std::string> {
-    double sum = 0.0;
-    for (const double value : set) sum += value;
-    return sum < limit ? std::nullopt : std::optional<std::string>("sum too large");
-  });
+  return feasibleWhere([limit](const auto& set) { return std::accumulate(set.begin(), set.end(), 0.0) < limit; },
+                       "sum too large");
 }
 
 const SearchBounds kBounds{{0, 0}, {10, 10}, {1, 1}};
@@ -63,9 +61,7 @@ TEST(FeasiblePoints, AreDrawnBackTowardsTheFirstOriginThatCanBeRun) {
   EXPECT_EQ(points.drawnBack({8, 8}, {outside}), (ParameterSet{2, 2})) << "towards the set of the sample";
   EXPECT_EQ(points.draw([] { return ParameterSet{9, 3}; }, inside), (ParameterSet{2.25, 2.25}));
   // Nothing on the way can be run.
-  FeasiblePoints single(Feasibility([](std::span<const double> set) -> std::optional<std::string> {
-    return set[0] == 0.0 ? std::nullopt : std::optional<std::string>("not 0");
-  }));
+  FeasiblePoints single(feasibleWhere([](const auto& set) { return set[0] == 0.0; }, "not 0"));
   EXPECT_EQ(single.drawnBack({8, 8}, {inside}), inside);
 }
 

@@ -183,6 +183,11 @@ TEST_P(EitherSearch, PutsAPredictedMinimumInThePlaceOfThePointThatItRefines) {
   for (const Individual& point : search->population()) EXPECT_NE(point.set, before.set);
 }
 
+void advanceBy(PopulationSearch& search, int loops) {
+  ASSERT_EQ(search.initialise(), kSearchOk);
+  for (int loop = 0; loop < loops; ++loop) ASSERT_EQ(search.advance(), kSearchOk);
+}
+
 /// A problem whose sample is (5, 5), (6, 5), (5, 7).
 SearchProblem fromThreePoints(Evaluator& evaluator, UniformGenerator& random) {
   InitialSampleSettings fromFile;
@@ -196,8 +201,7 @@ TEST(Sce, ReflectsTheWorstPointOfTheSubcomplexFirst) {
   FunctionEvaluator evaluator([](const ParameterSet& x) { return resultOf(x[0] + x[1]); });
   UniformGenerator random(1);
   Sce sce({1, 3, 1}, {3}, fromThreePoints(evaluator, random));
-  ASSERT_EQ(sce.initialise(), kSearchOk);
-  ASSERT_EQ(sce.advance(), kSearchOk);
+  advanceBy(sce, 1);
   // g = (5.5, 5), u = (5, 7), a = 1 for two parameters: 2g − u = (6, 3).
   ASSERT_EQ(evaluator.batches.size(), 2U);
   EXPECT_EQ(evaluator.batches[1], (std::vector<ParameterSet>{{6, 3}}));
@@ -209,8 +213,7 @@ TEST(Sce, ContractsWhereTheReflectionIsNoBetterAndElseTakesARandomPoint) {
   FunctionEvaluator counting([&](const ParameterSet&) { return resultOf(counting.evaluationCount + 1); });
   UniformGenerator random(1);
   Sce sce({1, 3, 1}, {3}, fromThreePoints(counting, random));
-  ASSERT_EQ(sce.initialise(), kSearchOk);
-  ASSERT_EQ(sce.advance(), kSearchOk);
+  advanceBy(sce, 1);
   ASSERT_EQ(counting.batches.size(), 4U);
   EXPECT_THAT(counting.batches[1][0], ElementsAre(6, 3));
   // g + 0.4·(u − g)
@@ -224,8 +227,7 @@ TEST(Sce, RunsOneProposalOfEveryComplexAtATime) {
   FunctionEvaluator evaluator([](const ParameterSet& x) { return resultOf(testing::rosenbrock(x)); });
   UniformGenerator random(3);
   Sce sce({6, 5, 5}, {3}, {{{-5, -2}, {5, 8}, {0, 0}}, onBudget(100000), {}, {}, evaluator, random});
-  ASSERT_EQ(sce.initialise(), kSearchOk);
-  ASSERT_EQ(sce.advance(), kSearchOk);
+  advanceBy(sce, 1);
   ASSERT_GE(evaluator.batches.size(), 6U);
   EXPECT_EQ(evaluator.batches[0].size(), 30U);
   EXPECT_EQ(evaluator.batches[1].size(), 6U);
@@ -247,8 +249,7 @@ TEST(Pse, ReflectsThenContractsAndGivesAStuckPointUp) {
   FunctionEvaluator counting([&](const ParameterSet&) { return resultOf(counting.evaluationCount + 1); });
   UniformGenerator random(1);
   Pse pse({3, 1.0, 0.0}, {3}, fromThreePoints(counting, random));
-  ASSERT_EQ(pse.initialise(), kSearchOk);
-  for (int loop = 0; loop < 3; ++loop) ASSERT_EQ(pse.advance(), kSearchOk);
+  advanceBy(pse, 3);
   // The best point stays; its turn goes to the worst one, whose offspring are the last two of a batch.
   ASSERT_EQ(counting.batches.size(), 4U);
   const ParameterSet reflected{5.5 + 1.1 * 0.5, 5 - 1.1 * 2};
@@ -268,8 +269,7 @@ TEST(Pse, AMutationLeavesAPointItsPlaceInTheMoves) {
     FunctionEvaluator counting([&](const ParameterSet&) { return resultOf(counting.evaluationCount + 1); });
     UniformGenerator random(seed);
     Pse pse({3, 0.5, 0.0}, {3}, fromThreePoints(counting, random));
-    ASSERT_EQ(pse.initialise(), kSearchOk);
-    for (int loop = 0; loop < 6; ++loop) ASSERT_EQ(pse.advance(), kSearchOk);
+    advanceBy(pse, 6);
     const auto hasReflection = [](const std::vector<ParameterSet>& batch) {
       return std::ranges::any_of(batch, [](const ParameterSet& x) { return std::abs(x[0] - 6.05) < 1e-9; });
     };

@@ -61,7 +61,7 @@ TEST(ProcessFolder, ReplacesWhatWasThere) {
 
   EXPECT_EQ(folder.read("run_Process1/run.sh"), "new");
   EXPECT_FALSE(folder.exists("run_Process1/left"));
-  EXPECT_EQ(folder.read("run_Process1/" + std::string(run_files::kBatchLog)), "") << "known for what it is from now on";
+  EXPECT_TRUE(folder.exists("run_Process1/" + std::string(run_files::kFolderMark)));
   EXPECT_EQ(folder.read("elsewhere/kept.txt"), "kept");
 }
 

@@ -129,13 +129,9 @@ TEST(NetcdfTimeSeries, ReadsVariablesStationsAndPacking) {
 }
 
 TEST(NetcdfTimeSeries, MarkersAndLimitsAreComparedAsTheFileHoldsNumbers) {
-  struct Attribute {
-    const char* name;
-    nc_type type;
-    std::vector<double> numbers;
-  };
+  using Attribute = std::tuple<const char*, nc_type, std::vector<double>>;
   constexpr float kGap = -999999.0F;
-  // The numbers stored, and the values read.
+  // The attributes, the numbers stored, and the values read.
   const std::tuple<nc_type, std::vector<Attribute>, std::vector<double>, std::vector<float>> cases[] = {
       {NC_FLOAT, {{"missing_value", NC_DOUBLE, {1e20, -9999.9}}}, {1e20, 5, -9999.9}, {kGap, 5, kGap}},
       {NC_DOUBLE, {{"missing_value", NC_FLOAT, {-9999.9}}}, {-9999.9, -9999.8}, {kGap, -9999.8F}},
@@ -159,11 +155,11 @@ TEST(NetcdfTimeSeries, MarkersAndLimitsAreComparedAsTheFileHoldsNumbers) {
   for (const auto& [type, attributes, stored, expected] : cases) {
     NetcdfFile file("markers.nc");
     const int flow = file.defineFlow(type, stored);
-    for (const Attribute& each : attributes) file.numbers(flow, each.name, each.type, each.numbers);
+    for (const auto& [name, ofType, numbers] : attributes) file.numbers(flow, name, ofType, numbers);
     file.close();
     NetcdfTimeSeries series;
     ASSERT_TRUE(series.open(file.path())) << series.lastError();
-    EXPECT_EQ(valuesOf(series, 1), expected) << attributes.front().name << " " << attributes.front().numbers.front();
+    EXPECT_EQ(valuesOf(series, 1), expected) << ::testing::PrintToString(attributes);
   }
 }
 

@@ -2,6 +2,7 @@
 
 #include <cmath>
 #include <functional>
+#include <tuple>
 
 #include <fmt/format.h>
 #include <gmock/gmock.h>
@@ -32,10 +33,7 @@ class RestartSettingsTest : public SetupFixture {
 
 TEST_F(RestartSettingsTest, WhatHasChangedIsNamed) {
   const RunConfig then = read();
-  const struct {
-    const char* edits;
-    std::vector<std::string> changes;
-  } cases[] = {
+  const std::pair<const char*, std::vector<std::string>> cases[] = {
       {"", {}},
       {"Upper catchment    => x & NoSimultaneousSim = 4 => NoSimultaneousSim = 2\nMaxSimulationTime = 5", {}},
       {"'model\\run.sh' => './model/run.sh' & Upper_Bound = 900 => 9.0E2", {}},
@@ -53,7 +51,7 @@ TEST_F(RestartSettingsTest, WhatHasChangedIsNamed) {
         "Right_Equation of MODEL_PARAMETERS/INTERNAL_CONSTRAINTS/CONSTRAINT_1: 'Depth' then, absent now",
         "Logical_Operator of MODEL_PARAMETERS/INTERNAL_CONSTRAINTS/CONSTRAINT_1: 1 then, absent now"}},
   };
-  for (const auto& row : cases) EXPECT_EQ(changes(then, read(row.edits)), row.changes);
+  for (const auto& [edits, expected] : cases) EXPECT_EQ(changes(then, read(edits)), expected);
 }
 
 TEST_F(RestartSettingsTest, AKeywordThatAnEarlierVersionDidNotKnowWorkedAsItsDefaultDoes) {
@@ -151,27 +149,22 @@ TEST_F(EarlierRunTest, ARaisedBudgetOfDdsIsAnotherSearch) {
     read.restart = RestartMode::goOn;
     return read;
   };
-  std::string rows;
-  for (int number = 1; number <= 11; ++number) rows += row(number);
-  const struct {
-    int then;
-    int count;  ///< of rows
-    std::vector<EarlierSearch> before;
-    std::vector<int> lastEvaluations;
-  } cases[] = {{10, 11, {}, {10}},              // finished, with its final run
-               {10, 7, {}, {7}},                // cut off
-               {10, 2, {}, {5}},                // in the start points, which it needs
-               {20, 11, {{10, 10}}, {10, 11}},  // a second time
-               {20, 10, {{10, 10}}, {10}}};     // the second search had not begun
-  for (const auto& c : cases) {
-    RunConfig then = config(c.then);
-    then.task->continueFrom(c.before);
+  // The budget then, the number of rows, the searches before, the last evaluation of each search.
+  const std::tuple<int, int, std::vector<EarlierSearch>, std::vector<int>> cases[] = {
+      {10, 11, {}, {10}},              // finished, with its final run
+      {10, 7, {}, {7}},                // cut off
+      {10, 2, {}, {5}},                // in the start points, which it needs
+      {20, 11, {{10, 10}}, {10, 11}},  // a second time
+      {20, 10, {{10, 10}}, {10}}};     // the second search had not begun
+  for (const auto& [budget, count, before, lastEvaluations] : cases) {
+    RunConfig then = config(budget);
+    then.task->continueFrom(before);
     std::string some;
-    for (int number = 1; number <= c.count; ++number) some += row(number);
+    for (int number = 1; number <= count; ++number) some += row(number);
     taken(then, config(40), some);
     std::vector<int> last;
     for (const EarlierSearch& search : searches_) last.push_back(search.lastEvaluation);
-    EXPECT_EQ(last, c.lastEvaluations) << c.then << " " << c.count;
+    EXPECT_EQ(last, lastEvaluations) << budget << " " << count;
   }
 }
 
@@ -180,19 +173,17 @@ TEST_F(EarlierRunTest, WithoutItsSettingsOrItsHeaderItIsRefused) {
   const RestartFiles files = restartFiles(folder_ / "setup", run_files::kOptimisation);
   const std::string settings = formatRestartSettings(restartSettings(config));
   const std::string damaged = "Evalu\tStatus\n" + row(1) + row(2);
-  const struct {
-    std::string results;
-    const char* settings;  ///< no file when empty
-    const char* detail;
-  } cases[] = {{std::string(kHeader) + row(1), "", "setup_Optimisation_Restart.dat"},
-               {std::string(kHeader) + row(1), "# nothing\n", "setup_Optimisation_Restart.dat"},
-               {damaged, "", "setup_Optimisation.dat has no header row that can be read"},
-               {std::string(kHeader) + row(1), settings.c_str(), "setup_Optimisation.dat has other columns than"}};
-  for (const auto& c : cases) {
-    folder_.write("setup_Optimisation.dat", c.results);
-    if (*c.settings != 0) folder_.write("setup_Optimisation_Restart.dat", c.settings);
+  // The results, the settings (no file when empty), what is said.
+  const std::tuple<std::string, std::string, const char*> cases[] = {
+      {std::string(kHeader) + row(1), "", "setup_Optimisation_Restart.dat"},
+      {std::string(kHeader) + row(1), "# nothing\n", "setup_Optimisation_Restart.dat"},
+      {damaged, "", "setup_Optimisation.dat has no header row that can be read"},
+      {std::string(kHeader) + row(1), settings, "setup_Optimisation.dat has other columns than"}};
+  for (const auto& [results, written, detail] : cases) {
+    folder_.write("setup_Optimisation.dat", results);
+    if (!written.empty()) folder_.write("setup_Optimisation_Restart.dat", written);
     EXPECT_THAT(withoutFolder(refusalOf([&] { findEarlierRun(files, config, {}, std::nullopt); })),
-                HasSubstr(std::string("\n") + c.detail));
+                HasSubstr(std::string("\n") + detail));
   }
 }
 

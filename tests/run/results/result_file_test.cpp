@@ -1,7 +1,6 @@
 #include "run/results/result_file.h"
 
-#include <signal.h>
-#include <sys/resource.h>
+#include <tuple>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -44,6 +43,7 @@ class ResultFileTest : public ::testing::Test {
   TemporaryFolder folder_;
   std::string path_ = (folder_ / "r.dat");
   ResultFile results_;
+  std::string reason_;
 };
 
 TEST_F(ResultFileTest, EveryRowIsOnDiskAtOnceAndReadsBackExactly) {
@@ -60,9 +60,8 @@ TEST_F(ResultFileTest, RowsEndUpInTheOrderOfTheirNumbers) {
   for (const std::vector<int>& arrival : {std::vector{1, 2, 3}, {3, 1, 2}, {2, 3, 1}, std::vector<int>{}}) {
     open();
     for (const int number : arrival) add(success(number, number, number), number);
-    std::string reason;
     const std::vector<std::string> closing{"done", "Best evaluation: 1"};
-    ASSERT_TRUE(results_.finish(closing, reason)) << reason;
+    ASSERT_TRUE(results_.finish(closing, reason_)) << reason_;
     std::string expected(kHeadText);
     if (!arrival.empty()) expected += "1\tOK\t1\t1\t1\t1\n2\tOK\t2\t2\t2\t2\n3\tOK\t3\t3\t3\t3\n";
     EXPECT_EQ(folder_.read("r.dat"), expected + "# done\n# Best evaluation: 1\n");
@@ -75,9 +74,8 @@ TEST_F(ResultFileTest, RowsStayWhereTheyAreWhenTheyCannotBePutInOrder) {
   open();
   add(success(2, 2, 2), 2);
   add(success(1, 1, 1), 1);
-  std::string reason;
-  EXPECT_FALSE(results_.finish(std::vector<std::string>{"done"}, reason));
-  EXPECT_EQ(reason, "Is a directory");
+  EXPECT_FALSE(results_.finish(std::vector<std::string>{"done"}, reason_));
+  EXPECT_EQ(reason_, "Is a directory");
   EXPECT_TRUE(folder_.read("r.dat").ends_with("2\tOK\t2\t2\t2\t2\n1\tOK\t1\t1\t1\t1\n# done\n"));
 }
 
@@ -85,46 +83,21 @@ TEST_F(ResultFileTest, AFullDiskIsReportedOnceWithItsReason) {
   std::filesystem::create_symlink("/dev/full", path_);
   EXPECT_EQ(refusalOf([this] { open(); }), "Error: Unable to write to " + path_ + "\nNo space left on device");
   add(success(1, 1, 1), 1);
-  std::string reason;
-  EXPECT_FALSE(results_.finish({}, reason));
-}
-
-/// Runs out of room in the middle of a row; in a process of its own, as the limit cannot be taken back.
-void writeUntilNoRoomIsLeft(const std::string& path) {
-  ::signal(SIGXFSZ, SIG_IGN);
-  const rlimit limit{200, 200};
-  ::setrlimit(RLIMIT_FSIZE, &limit);
-  ResultFile results;
-  results.open(path, kHead, kColumns);
-  const double parameter = 1.0 / 3.0;
-  try {
-    for (int number = 1;; ++number) results.addRow(resultRow(std::span(&parameter, 1), success(number, 1, 1)));
-  } catch (const FatalError&) {
-    ::_exit(7);
-  }
-}
-
-TEST_F(ResultFileTest, ARowThatDoesNotFitLeavesNoTornHalf) {
-  EXPECT_EXIT(writeUntilNoRoomIsLeft(path_), ::testing::ExitedWithCode(7), "");
-  const std::string content = folder_.read("r.dat");
-  EXPECT_LT(content.size(), 200U);
-  EXPECT_THAT(content, ::testing::EndsWith("\t1\t1\t1\n"));
+  EXPECT_FALSE(results_.finish({}, reason_));
 }
 
 TEST(KeepEarlierFile, NumbersWithoutOverwriting) {
   const TemporaryFolder folder;
-  const struct {
-    const char* name;
-    const char* madeFile;
-    const char* kept;
-  } cases[] = {{"a.b/r.dat", "a.b/r.dat", "a.b/r.1.dat"},
-               {"a.b/r.dat", "a.b/r.dat", "a.b/r.2.dat"},
-               {"a.b/r.dat", nullptr, ""},
-               {"a.b/no_ending", "a.b/no_ending", "a.b/no_ending.1"},
-               {"v1.1.2_Saved", "v1.1.2_Saved/1/out.csv", "v1.1.2_Saved.1"}};
-  for (const auto& c : cases) {
-    if (c.madeFile != nullptr) folder.write(c.madeFile, c.kept);
-    EXPECT_EQ(keepEarlierFile(folder / c.name), *c.kept == '\0' ? "" : folder / c.kept);
+  // The name, the file that is made, and what is kept.
+  const std::tuple<const char*, const char*, const char*> cases[] = {
+      {"a.b/r.dat", "a.b/r.dat", "a.b/r.1.dat"},
+      {"a.b/r.dat", "a.b/r.dat", "a.b/r.2.dat"},
+      {"a.b/r.dat", nullptr, ""},
+      {"a.b/no_ending", "a.b/no_ending", "a.b/no_ending.1"},
+      {"v1.1.2_Saved", "v1.1.2_Saved/1/out.csv", "v1.1.2_Saved.1"}};
+  for (const auto& [name, madeFile, kept] : cases) {
+    if (madeFile != nullptr) folder.write(madeFile, kept);
+    EXPECT_EQ(keepEarlierFile(folder / name), *kept == '\0' ? "" : folder / kept);
   }
   EXPECT_EQ(folder.read("a.b/r.1.dat"), "a.b/r.1.dat");
   EXPECT_EQ(folder.read("v1.1.2_Saved.1/1/out.csv"), "v1.1.2_Saved.1");

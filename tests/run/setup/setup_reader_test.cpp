@@ -33,6 +33,7 @@ TEST_F(SetupReaderTest, FillsTheConfigurationOfAnOptimisation) {
   const auto& task = dynamic_cast<const OptimisationTask&>(*config.task);
   EXPECT_EQ(task.method->populationSize(), 20);
   EXPECT_EQ(dynamic_cast<const PopulationMethod&>(*task.method).simplex.pointCount, 5);
+  EXPECT_THAT(read("Option = 2 => 0").parameters[0].givenValues, ElementsAre(412.5));
 }
 
 TEST_F(SetupReaderTest, RefusesWhatCannotBeReadAndSaysWhere) {
@@ -94,8 +95,7 @@ TEST_F(SetupReaderTest, RefusesWhatCannotBeReadAndSaysWhere) {
        " section SAVE_OUTPUT_FILES in KDX file\nsetup.kdx:1:1: expected section [SAVE_OUTPUT_FILES] in section "
        "MIREVO_PARAMETERS\nsections to add:\n   in [MIREVO_PARAMETERS]:\n   [SAVE_OUTPUT_FILES]\n   "
        "[/SAVE_OUTPUT_FILES]\n   in [OPTIMISATION_ALGORITHM]:\n   [STOPPING_CRITERIA]\n     Max_No_Evaluations = ...\n "
-       "  "
-       "[/STOPPING_CRITERIA]"},
+       "  [/STOPPING_CRITERIA]"},
   };
   for (const auto& [edits, error] : others) EXPECT_EQ(failure(edits), std::string("Error: Unable to open") + error);
   EXPECT_EQ(failure(title(longText.substr(1) + "   ")), "") << "trailing blanks do not count";
@@ -200,28 +200,24 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatAreSeldomMeant)
       {"Aggregation_Method = 0 => 3 & Option = 2 => 0 & NoSimultaneousSim = 4 => 1", ""},
       {"Statistic_Type = 1 => 0 & Function_Type = 2 => 0",
        "setup.kdx:92:25: Function_Type: a sum with a difference that may be negative (\"Flow error\") is the smaller "
-       "the "
-       "further the simulation is below the observation, and the search looks for the smallest: absolute values or "
-       "squares are meant for differences"},
+       "the further the simulation is below the observation, and the search looks for the smallest: absolute values "
+       "or squares are meant for differences"},
       {"Statistic_Type = 1 => 4 & Function_Type = 2 => 0", "Function_Type: a sum with a difference"},
       {"Statistic_Type = 1 => 0", ""},
       {"Function_Type = 2 => 0", ""},
       {"Statistic_Type = 1 => 0 & Function_Type = 2 => 0 & Weight = 1.25 => 0", ""},
       {"Statistic_Type = 1 => 0 & Function_Type = 2 => 0 & Option = 2 => 0 & NoSimultaneousSim = 4 => 1", ""},
       {"Algorithm_Type = 1 => 2 & Use_Surrogate_Model = 1 => 0 & Initial_Value = 412.5 => 100 & Upper_Bound = 900 => "
-       "100 & "
-       "Initial_Value = 0.31D0 => 0 & Upper_Bound = 1.0 => 0 & NoSimultaneousSim = 4 => 1",
+       "100 & Initial_Value = 0.31D0 => 0 & Upper_Bound = 1.0 => 0 & NoSimultaneousSim = 4 => 1",
        "setup.kdx:28:21: Upper_Bound: the bounds leave one value to every variable parameter: all sets of the search "
        "are the same"},
       {"Algorithm_Type = 1 => 2 & Use_Surrogate_Model = 1 => 0 & Initial_Value = 412.5 => 100 & Upper_Bound = 900 => "
-       "100 & "
-       "NoSimultaneousSim = 4 => 1",
+       "100 & NoSimultaneousSim = 4 => 1",
        ""},
       {"TqSEKdxListItemCount = 1 // files => TqSEKdxListItemCount = 2\n[SIMPARAMITEM_2]\nParamFileName = "
        "'model/soil.par'\nTemplateFileName = 'model/soil.tpl'\n[/SIMPARAMITEM_2]",
        "setup.kdx:14:17: ParamFileName: SIMPARAMITEM_1 writes this file, too; the model gets what is written last, "
-       "from "
-       "this item"},
+       "from this item"},
       {"Parameter_Name = 'Rate' => Parameter_Name = 'Rate'\nParameter_Equation = 'Depth * 2'",
        "setup.kdx:38:22: Parameter_Equation: not used, as only Parameter_Type = 2 makes a parameter dependent"},
       {"'model/soil.tpl' => 'model/blank.tpl'\nFileType = 1 & Parameter_Name = 'Rate' => Parameter_Name = "

@@ -11,7 +11,6 @@
 #include "refusal.h"
 #include "run/tasks/optimisation_task.h"
 #include "run/tasks/scenario_task.h"
-#include "run/tasks/uncertainty_task.h"
 
 namespace mirevo {
 namespace {
@@ -29,9 +28,7 @@ class TasksTest : public ::testing::Test {
       EXPECT_THAT(evaluator_.batches, IsEmpty()) << "before the first model run";
       warnings_.emplace_back(text);
     };
-    const TaskOutcome outcome = task.run(context);
-    report_ = outcome.report;
-    return outcome.terminationMessage;
+    return task.run(context).terminationMessage;
   }
 
   std::vector<ModelParameter> parameters_{parameter("a", ParameterType::variable, TransformationType::none),
@@ -45,7 +42,6 @@ class TasksTest : public ::testing::Test {
   RunLog log_;
   Feasibility feasibility_;
   std::vector<std::string> warnings_;  ///< shown to the user
-  std::vector<std::string> report_;
 };
 
 TEST_F(TasksTest, MultipleRunsAreOneBatchAndComeBackToTheirModelValues) {
@@ -68,9 +64,7 @@ TEST_F(TasksTest, AScenarioValueWithoutALogarithmIsRefusedByRunAndParameter) {
 }
 
 TEST_F(TasksTest, MoreSetsThatCannotBeRunThanMayFailAreToldBeforeTheFirstModelRun) {
-  feasibility_ = Feasibility([](std::span<const double> set) -> std::optional<std::string> {
-    return set[0] < 5.0 ? std::nullopt : std::optional<std::string>("constraint 1 (a < 5)");
-  });
+  feasibility_ = feasibleWhere([](const auto& set) { return set[0] < 5.0; }, "constraint 1 (a < 5)");
   ScenarioTask scenarios;
   scenarios.settings.type = ScenarioType::multipleRuns;
   for (int i = 0; i < 30; ++i) scenarios.settings.runs.push_back({{i < 27 ? 1.0 : 6.0, 1.0, 1.0, 1.0}});
@@ -86,36 +80,14 @@ TEST_F(TasksTest, MoreSetsThatCannotBeRunThanMayFailAreToldBeforeTheFirstModelRu
                   "   No. 1: constraint 1 (a < 5)\n"
                   "   The run will end before it is complete: at most 3 may fail, a tenth of the 30 planned"));
 
-  UncertaintyTask uncertainty;
-  uncertainty.settings = {SamplingType::simpleRandom, 50, {{4.0, 2.0}, {0.0, 1.0}, {2.0, 1.0}}};
-  evaluator_.batches.clear();
-  run(uncertainty);
-  ASSERT_EQ(warnings_.size(), 2U);
-  EXPECT_THAT(warnings_[1], AllOf(HasSubstr(" of 50 sets of the sample, "), HasSubstr("Redraw_Infeasible = 1")));
-  uncertainty.settings.redrawsInfeasible = true;
-  evaluator_.batches.clear();
-  run(uncertainty);
-  EXPECT_EQ(warnings_.size(), 2U);
-  for (const ParameterSet& set : evaluator_.batches.at(0)) EXPECT_TRUE(feasibility_.holds(set));
-  EXPECT_THAT(report_.at(1), ::testing::MatchesRegex("Redraw_Infeasible: 50 sets that can be run out of [0-9]+ drawn, "
-                                                     "an acceptance rate of [0-9.]+ %"));
-
   OptimisationTask optimisation;  // from initial values that violate it
   space_.initial[0] = 9.0;
   optimisation.method = searchMethods().make(SetupValue(2));
   optimisation.stopping = {.maxEvaluations = 9, .minChange = 0.0};
   evaluator_.batches.clear();
   run(optimisation);
-  ASSERT_EQ(warnings_.size(), 3U);
-  EXPECT_THAT(warnings_[2], StartsWith("Constraints are violated by 1 of 1 given sets of the initial sample, "));
-}
-
-TEST_F(TasksTest, AnUnknownUseOfASurrogateModelRunsNothingAndEndsNormally) {
-  OptimisationTask optimisation;
-  optimisation.method = searchMethods().make(SetupValue(2));
-  optimisation.surrogateUse = SurrogateUse{2};
-  EXPECT_EQ(run(optimisation), "Normal termination");
-  EXPECT_TRUE(evaluator_.batches.empty());
+  ASSERT_EQ(warnings_.size(), 2U);
+  EXPECT_THAT(warnings_[1], StartsWith("Constraints are violated by 1 of 1 given sets of the initial sample, "));
 }
 
 TEST_F(TasksTest, AfterEverySearchItsBestSetIsTheFinalModelRun) {
