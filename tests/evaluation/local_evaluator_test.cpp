@@ -228,7 +228,9 @@ TEST_F(LocalEvaluatorTest, AGivenLogarithmicValueIsThatOfAnEarlierVersionToo) {
                     .transformation = {TransformationType::logarithmic}};
   space.givenValues[{0, std::log(5.0)}] = 5.0;
   const ObjectiveAggregator aggregator(description_.objectives, method_);
-  EarlierEvaluations evaluations(space, aggregator, {{1, {{earlier}, {}}}, {2, {{std::nextafter(earlier, 0.0)}, {}}}});
+  const EvaluationResult result{.measureValues = {1.0}, .objectiveValues = {1.0}};
+  EarlierEvaluations evaluations(space, aggregator,
+                                 {{1, {{earlier}, result}}, {2, {{std::nextafter(earlier, 0.0)}, result}}});
   EXPECT_TRUE(evaluations.take(1, space.initial));
   EXPECT_THAT(refusalOf([&] { evaluations.take(2, space.initial); }), HasSubstr("has k = 4.99"));
 }
