@@ -11,8 +11,8 @@ namespace mirevo {
 /// of the setup. What an earlier run made is kept with a number before the extension: `basin_Saved.2`,
 /// `basin_Optimisation.1.dat`.
 struct RunFile {
-  std::string_view stem;
-  std::string_view extension;
+  std::string_view stem = "";
+  std::string_view extension = "";
   bool isNumbered = false;   ///< a number follows the stem
   bool mayBeModels = false;  ///< so plain a name that only the content tells it from a file of the model
   /// What the first lines of every such file contain, in every version of the program. Empty: nothing, and the name is
@@ -35,13 +35,14 @@ struct ResultFileNames {
 /// The names of all that a run makes. Nothing else builds such a name.
 namespace run_files {
 
-inline constexpr RunFile kLog{"", ".log", false, true, "Mirevo "};
-inline constexpr RunFile kTerminationLog{"_Termination", ".log", false, false, ""};
-inline constexpr RunFile kMessages{"", "._spi_", false, false, ""};
-inline constexpr RunFile kKill{"", "._kill_", false, false, ""};
+inline constexpr RunFile kLog{.extension = ".log", .mayBeModels = true, .mark = "Mirevo "};
+inline constexpr RunFile kTerminationLog{.stem = "_Termination", .extension = ".log", .mark = ""};
+inline constexpr RunFile kMessages{.extension = "._spi_", .mark = ""};
+inline constexpr RunFile kKill{.extension = "._kill_", .mark = ""};
 inline constexpr RunFile kSeries{"_Series", ".dat"};
-inline constexpr RunFile kReport{"_Report", ".html", false, false, "content=\"default-src 'none'; script-src"};
-inline constexpr RunFile kBand{"_Band_", ".csv", true, false, "# Band of "};
+inline constexpr RunFile kReport{
+    .stem = "_Report", .extension = ".html", .mark = "content=\"default-src 'none'; script-src"};
+inline constexpr RunFile kBand{.stem = "_Band_", .extension = ".csv", .isNumbered = true, .mark = "# Band of "};
 inline constexpr RunFile kSavedFolder{"_Saved", ""};
 /// These two stand beside the setup, or in the folder that it names for them.
 inline constexpr RunFile kFailedFolder{"_Failed", "", true};
@@ -49,8 +50,8 @@ inline constexpr RunFile kProcessFolder{"_Process", "", true};
 
 /// What keeps a second run away (common/file_lock): from the files with the setup's name, and from the process folders,
 /// beside which it lies; the runs of a job share that.
-inline constexpr RunFile kRunLock{"", "._lock_", false, false, ""};
-inline constexpr RunFile kProcessLock{"_Process", "._lock_", false, false, ""};
+inline constexpr RunFile kRunLock{.extension = "._lock_", .mark = ""};
+inline constexpr RunFile kProcessLock{.stem = "_Process", .extension = "._lock_", .mark = ""};
 
 /// Tables of analyses.
 inline constexpr RunFile kCovariance{"_Covariance", ".dat", false, true};
@@ -63,34 +64,31 @@ inline constexpr RunFile kSampleCorrelation{"_SampleCorrelation", ".dat", false,
 inline constexpr std::array kUncertaintyTables{kQuantiles, kSampleCorrelation};
 inline constexpr std::array kSensitivityTables{kCovariance, kCorrelation, kParameterLimits, kJacobian, kSensitivities};
 
-inline constexpr std::string_view kRestartMark = "# What the results beside this file depend on";
-inline constexpr std::string_view kSimulatedMark = "v0veriM";  ///< its number's bytes, without the version
+/// What all tasks call alike behind their own stem.
+constexpr RunFile restartFile(std::string_view stem) {
+  return {.stem = stem, .extension = ".dat", .mark = "# What the results beside this file depend on"};
+}
+constexpr RunFile simulatedFile(std::string_view stem) {
+  return {.stem = stem, .extension = ".bin", .mark = "v0veriM"};  // the bytes of its first number but for the version
+}
 
 /// Scenario runs and the uncertainty analysis.
-inline constexpr ResultFileNames kPlain{{"", ".dat", false, true},
-                                        {"_Restart", ".dat", false, false, kRestartMark},
-                                        {"_Simulated", ".bin", false, false, kSimulatedMark},
-                                        {"_Run", ".dat", false, true},
-                                        {"_Failures", ".dat", false, true},
-                                        kUncertaintyTables};
-inline constexpr ResultFileNames kSensitivity{{"_Sensitivity", ".dat"},
-                                              {"_Sensitivity_Restart", ".dat", false, false, kRestartMark},
-                                              {"_Sensitivity_Simulated", ".bin", false, false, kSimulatedMark},
-                                              {"_Sensitivity_Run", ".dat"},
-                                              {"_Sensitivity_Failures", ".dat"},
-                                              kSensitivityTables};
-inline constexpr ResultFileNames kOptimisation{{"_Optimisation", ".dat"},
-                                               {"_Optimisation_Restart", ".dat", false, false, kRestartMark},
-                                               {"_Optimisation_Simulated", ".bin", false, false, kSimulatedMark},
-                                               {"_Optimisation_Run", ".dat"},
-                                               {"_Optimisation_Failures", ".dat"},
-                                               {}};
+inline constexpr ResultFileNames kPlain{{"", ".dat", false, true},          restartFile("_Restart"),
+                                        simulatedFile("_Simulated"),        {"_Run", ".dat", false, true},
+                                        {"_Failures", ".dat", false, true}, kUncertaintyTables};
+inline constexpr ResultFileNames kSensitivity{
+    {"_Sensitivity", ".dat"},     restartFile("_Sensitivity_Restart"), simulatedFile("_Sensitivity_Simulated"),
+    {"_Sensitivity_Run", ".dat"}, {"_Sensitivity_Failures", ".dat"},   kSensitivityTables};
+inline constexpr ResultFileNames kOptimisation{
+    {"_Optimisation", ".dat"},     restartFile("_Optimisation_Restart"), simulatedFile("_Optimisation_Simulated"),
+    {"_Optimisation_Run", ".dat"}, {"_Optimisation_Failures", ".dat"},   {}};
 
+inline constexpr std::string_view kFailuresMark = "# Failed evaluations of ";
 /// Stands beside the setup without its name, for the run that was the first of those going on in the folder; another
 /// has a file of its own.
-inline constexpr RunFile kFailedRuns{"calSimErr", ".dat", false, false, "# Failed evaluations of "};
-inline constexpr RunFile kFailedRunsLock{"calSimErr", "._lock_", false, false, ""};
-inline constexpr RunFile kOwnFailedRuns{"_calSimErr", ".dat", false, false, "# Failed evaluations of "};
+inline constexpr RunFile kFailedRuns{.stem = "calSimErr", .extension = ".dat", .mark = kFailuresMark};
+inline constexpr RunFile kFailedRunsLock{.stem = "calSimErr", .extension = "._lock_", .mark = ""};
+inline constexpr RunFile kOwnFailedRuns{.stem = "_calSimErr", .extension = ".dat", .mark = kFailuresMark};
 
 /// An empty file by which a process folder, or a copy of one, is known. A model that removes its logs leaves it.
 inline constexpr char kFolderMark[] = ".mirevo_process";
@@ -108,15 +106,6 @@ std::string runFilePath(std::string_view prefix, const RunFile& file);
 std::string runFilePath(std::string_view prefix, const RunFile& file, int number);
 /// That of a file beside the setup without its name, `calSimErr.dat`.
 std::string pathBeside(std::string_view prefix, const RunFile& file);
-/// Whether the first lines of the file are those of a run's.
-bool carriesMark(const std::string& path, const RunFile& file);
-/// Why a run must not rename, replace or remove what is at `path`, as a sentence with the remedy. Empty where it may:
-/// there is nothing, a device, a file that carries the mark or has no more than a part of the head; for the folders of
-/// runs, one that is empty or holds what only theirs do, hidden files aside.
-std::string whyNotReplaceable(const std::string& path, const RunFile& file);
-/// Throws FatalError, with `path` and that sentence, unless it may be replaced.
-void requireReplaceable(const std::string& path, const RunFile& file);
-
 /// The file's name without a folder, for messages: `calSimErr.dat`, `basin_Failures.dat`.
 std::string fileNameOf(std::string_view path);
 

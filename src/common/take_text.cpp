@@ -11,6 +11,10 @@ bool takeText(std::string_view& text, std::string_view front) {
   return true;
 }
 
+bool isDigits(std::string_view text) {
+  return !text.empty() && text.find_first_not_of("0123456789") == std::string_view::npos;
+}
+
 std::string_view takeDigits(std::string_view& text, std::size_t least, std::size_t most) {
   const std::string_view digits = text.substr(0, std::min({text.find_first_not_of("0123456789"), text.size(), most}));
   if (digits.size() < least) return {};

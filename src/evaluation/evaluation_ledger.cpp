@@ -53,7 +53,7 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
   }
   std::string_view outcome = progress::kOk;
   if (!result.ok()) {
-    // A set that was not run is never a model run error, even if it is an equation that has no finite value.
+    // A set that cannot be run is no model run error, even if it is an equation that has no finite value.
     outcome = result.failure->isOfConstraints() ? progress::kConstraintsViolated : progress::kModelRunError;
   }
   std::optional<EvaluationResult> known;  // a repeated run has its row already, which is kept

@@ -11,7 +11,6 @@
 #include "common/fatal_error.h"
 #include "common/text.h"
 #include "common/utf8.h"
-#include "parameters/template_doubts.h"
 #include "parameters/template_file.h"
 #include "parameters/template_lines.h"
 

@@ -1,7 +1,5 @@
 #pragma once
 
-#include <cstddef>
-#include <optional>
 #include <span>
 #include <string>
 #include <string_view>
@@ -11,14 +9,6 @@
 #include "parameters/template_file.h"
 
 namespace mirevo {
-
-/// A parameter's ID value in a text.
-struct FoundIdValue {
-  std::size_t line = 0;  ///< from 1
-  std::string token;
-};
-/// The first ID value of a parameter; 0 counts as none.
-std::optional<FoundIdValue> findIdValue(std::string_view text, std::span<const ModelParameter> parameters);
 
 /// What is valid in a template and suggests that it is read in another way than meant, a warning each: text behind the
 /// delimiter, marks of the other kind of template, no placeholder at all.

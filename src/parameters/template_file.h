@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <optional>
 #include <span>
@@ -29,6 +30,14 @@ struct ParameterFileItem {
 /// The key by which ID values are compared: the value in units of 1e-37, computed in 64 bits with the single-precision
 /// constants 1.0e37 and 0.1. Empty if it does not fit into 32 bits: such a value is not an ID value.
 std::optional<std::int32_t> idKey(double value);
+
+/// A parameter's ID value in a text.
+struct FoundIdValue {
+  std::size_t line = 0;  ///< from 1
+  std::string token;
+};
+/// The first ID value of a parameter; 0 counts as none.
+std::optional<FoundIdValue> findIdValue(std::string_view text, std::span<const ModelParameter> parameters);
 
 /// Converts a numeric-ID template into a delimiter template, with its delimiter line. `templateName` is used in
 /// messages. Throws FatalError for an ID value that no parameter has, for a token that ends like an ID value but is not

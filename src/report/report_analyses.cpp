@@ -18,7 +18,7 @@
 #include "common/text.h"
 #include "evaluation/stored_results.h"
 #include "measures/period_series.h"
-#include "parameters/template_file.h"
+#include "parameters/read_template.h"
 #include "platform/series/time_series_object.h"
 
 namespace mirevo {
@@ -45,16 +45,10 @@ StoredResults resultsOf(const RunConfig& config, std::span<const ResultRow> rows
 std::vector<int> fieldWidths(const RunConfig& config) {
   std::vector<ParameterTemplate> templates;
   for (const ParameterFileItem& item : config.parameterFiles) {
-    const std::string name(trimTrailing(item.templateFileName));
-    const bool isNumericId = item.templateType == TemplateType::numericId;
-    std::string reason;
-    const auto text = readTextFile(name, reason);
-    if (!text) continue;
     try {
-      templates.emplace_back(name, isNumericId ? ConvertIdTemplate(name, *text, config.parameters) : *text,
-                             config.parameters, isNumericId);
+      templates.push_back(readTemplate(item, config.parameters).filled);
     } catch (const FatalError&) {
-      continue;  // changed since the run
+      continue;  // gone or changed since the run
     }
   }
   return widestPlaceholders(templates, config.parameters.size());

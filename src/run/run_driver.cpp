@@ -12,6 +12,7 @@
 #include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/progress_messages.h"
+#include "common/replaceable_files.h"
 #include "common/run_files.h"
 #include "common/text.h"
 #include "common/version.h"
@@ -141,14 +142,8 @@ void RunDriver::warn(std::string_view text) {
 void RunDriver::lockProcessFoldersOfJob(const std::string& prefix) {
   std::error_code ignored;
   if (!std::filesystem::is_directory(std::filesystem::path(prefix).parent_path(), ignored)) return;  // only there
-  const std::string path = processLockPath(prefix);
-  {
-    FileLock all;
-    if (!all.take(path, {0, state_.job->processCount()}, kLockPatienceSeconds)) {
-      fatalError("Error: Another run works in the same process folders", processFoldersInUse(prefix, all.holder()));
-    }
-  }
-  if (!processLock_.take(path, {}, kLockPatienceSeconds)) {
+  for (const int count : {state_.job->processCount(), 1}) {  // first all of them, then the master's own number alone
+    if (processLock_.take(processLockPath(prefix), {0, count}, kLockPatienceSeconds)) continue;
     fatalError("Error: Another run works in the same process folders",
                processFoldersInUse(prefix, processLock_.holder()));
   }

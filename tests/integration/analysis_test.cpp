@@ -326,6 +326,9 @@ TEST(UnfinishedAnalysis, ASensitivityAnalysisHasTheDerivativesThatItKnows) {
   const std::string table = folder.read("basin_Sensitivities.dat");
   EXPECT_NEAR(cellOf(table, {"a", "measure", "flow"}, "Derivative"), -0.816676, 1e-5);
   EXPECT_TRUE(std::isnan(cellOf(table, {"b", "measure", "flow"}, "Derivative")));
+  folder.write("basin_Band_1.csv", "# Band of an uncertainty analysis\n");
+  EXPECT_EQ(runProgram({folder.writeSetup({.option = 1, .restart = 1})}).exitCode, 1);
+  EXPECT_TRUE(folder.exists("basin_Band_1.csv")) << "it is not this task's";
 }
 
 TEST(UnfinishedAnalysis, OneThatIsCancelledHasStatisticsAndItsLogStillEndsWithTheReason) {

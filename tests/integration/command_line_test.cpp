@@ -97,7 +97,7 @@ TEST(Results, WhatIsNotOfARunIsNeitherRenamedNorRemoved) {
       folder.writeSetup({.option = 0, .scenarios = {"9, 1, 1", "5, 2, 1"}, .modelArguments = "--fail-above 8"});
   for (const char* name : {"basin.log", "basin.dat", "basin_Restart.dat", "basin_Run.dat", "basin_Failures.dat",
                            "basin_Quantiles.dat", "basin_Series.dat", "basin_Report.html", "basin_Saved/notes.txt",
-                           "basin_Process1/notes.txt", "calSimErr.dat"}) {
+                           "basin_Process1/notes.txt", "basin_Process1/.notes", "calSimErr.dat"}) {
     folder.write(name, "time,flow\n");
     const ProgramResult run = runProgram({setup});
     EXPECT_EQ(run.exitCode, 1) << name;

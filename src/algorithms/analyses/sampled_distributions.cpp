@@ -12,30 +12,25 @@ namespace {
 /// The 95 % quantile of the standard normal distribution.
 constexpr double kQuantile95 = 1.6448536269514722;
 
-double modelValue(const SearchSpace& space, std::size_t j, double value) {
-  bool failed = false;
-  return TransformParameterValue(value, space.lower[j], space.transformation[j], TransformDirection::backward, failed);
-}
-
 bool isInteger(const SearchSpace& space, std::size_t j) {
   return space.transformation[j] == TransformationType::integer;
 }
 
 /// The largest value of the model; the search range of an integer parameter ends one above it.
 double modelUpperBound(const SearchSpace& space, std::size_t j) {
-  return isInteger(space, j) ? space.upper[j] - 1.0 : modelValue(space, j, space.upper[j]);
+  return isInteger(space, j) ? space.upper[j] - 1.0 : toModelScale(space, j, space.upper[j]);
 }
 
 /// Whether the model gets a value within the bounds.
 bool isWithinBounds(const SearchSpace& space, std::size_t j, double value) {
   if (!isInteger(space, j)) return value >= space.lower[j] && value <= space.upper[j];
-  const double step = modelValue(space, j, value);
+  const double step = toModelScale(space, j, value);
   return step >= space.lower[j] && step <= modelUpperBound(space, j);
 }
 
 /// The model takes the step below a drawn value, so that a mean on a step has half of its values on the step below.
 std::string integerLine(const SearchSpace& space, std::size_t j, double mean) {
-  const double step = modelValue(space, j, mean);
+  const double step = toModelScale(space, j, mean);
   if (step <= space.lower[j]) return "    an integer: a drawn value is truncated to a step of its grid";
   const std::string half = std::abs(mean - step) < 1.0e-6
                                ? fmt::format(", so that half of the values are below {:.6g}", step)
@@ -57,9 +52,9 @@ std::vector<std::string> distributionLines(const UncertaintySettings& settings, 
     std::string line =
         fmt::format("  PARAMETER_{}: {}, mean {}, standard deviation {}{}; on the model scale ", j + 1, space.names[j],
                     formatReal(mean), formatReal(deviation), isLogarithm ? " of the natural logarithm" : "");
-    if (!isInteger(space, j)) line += fmt::format("median {:.6g}, ", modelValue(space, j, mean));
-    line += fmt::format("5 to 95 % from {:.6g} to {:.6g}", modelValue(space, j, mean - kQuantile95 * deviation),
-                        modelValue(space, j, mean + kQuantile95 * deviation));
+    if (!isInteger(space, j)) line += fmt::format("median {:.6g}, ", toModelScale(space, j, mean));
+    line += fmt::format("5 to 95 % from {:.6g} to {:.6g}", toModelScale(space, j, mean - kQuantile95 * deviation),
+                        toModelScale(space, j, mean + kQuantile95 * deviation));
     lines.push_back(std::move(line));
     if (isInteger(space, j)) lines.push_back(integerLine(space, j, mean));
   }
@@ -74,7 +69,7 @@ std::vector<std::string> distributionWarnings(const UncertaintySettings& setting
     std::string text = fmt::format(
         "Mean_Value of PARAMETER_{} ({}) is {}, on the model scale {:.6g}: outside the bounds {:.6g} to "
         "{:.6g}",
-        j + 1, space.names[j], formatReal(mean), modelValue(space, j, mean), modelValue(space, j, space.lower[j]),
+        j + 1, space.names[j], formatReal(mean), toModelScale(space, j, mean), toModelScale(space, j, space.lower[j]),
         modelUpperBound(space, j));
     const bool isLogarithm = space.transformation[j] == TransformationType::logarithmic;
     if (isLogarithm && mean > 0.0 && isWithinBounds(space, j, std::log(mean))) {

@@ -68,12 +68,12 @@ void FeasiblePoints::replaceInSample(std::vector<ParameterSet>& sample, std::siz
 ParameterSet FeasiblePoints::draw(const std::function<ParameterSet()>& drawPoint, std::span<const double> origin) {
   ParameterSet point = drawPoint();
   if (contain(point)) return point;
-  ++replacedCount_;
   for (int i = 0; i < kMostRedraws; ++i) {
     point = drawPoint();
-    if (contain(point)) return point;
+    if (!contain(point)) continue;
+    ++replacedCount_;
+    return point;
   }
-  --replacedCount_;  // counted by drawnBack()
   return drawnBack(std::move(point), {origin});
 }
 

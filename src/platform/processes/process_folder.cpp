@@ -20,6 +20,7 @@
 #include "common/fatal_error.h"
 #include "common/file_copy.h"
 #include "common/paths.h"
+#include "common/replaceable_files.h"
 #include "common/run_files.h"
 #include "common/take_text.h"
 #include "platform/processes/run_made_entries.h"
@@ -128,7 +129,7 @@ class ProcessFolderNames final {
   }
   bool contains(std::string_view name) const {
     if (!takeText(name, beginning_)) return false;
-    return name == run_files::kProcessLock.extension || (!takeDigits(name).empty() && name.empty());
+    return name == run_files::kProcessLock.extension || isDigits(name);
   }
 
  private:

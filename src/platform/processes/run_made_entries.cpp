@@ -5,6 +5,7 @@
 #include <utility>
 
 #include "common/files.h"
+#include "common/replaceable_files.h"
 #include "common/run_files.h"
 #include "common/take_text.h"
 #include "common/text.h"
@@ -28,14 +29,13 @@ bool isProcessFolder(const std::string& path) {
   constexpr std::string_view kMark = run_files::kProcessFolder.stem;
   const auto mark = path.rfind(kMark);
   if (mark == std::string::npos) return false;
-  std::string_view number = std::string_view(path).substr(mark + kMark.size());
+  const std::string_view number = std::string_view(path).substr(mark + kMark.size());
   if (number == run_files::kProcessLock.extension) return true;
   const auto holds = [&path](const char* name) {
     struct stat status {};
     return ::stat((path + "/" + name).c_str(), &status) == 0;
   };
-  return !takeDigits(number).empty() && number.empty() &&
-         (holds(run_files::kFolderMark) || holds(run_files::kBatchLog));
+  return isDigits(number) && (holds(run_files::kFolderMark) || holds(run_files::kBatchLog));
 }
 
 }  // namespace

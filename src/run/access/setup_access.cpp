@@ -49,19 +49,28 @@ std::string linesOfSection(std::string_view parent, std::string_view name, const
   return lines + fmt::format("\n   [/{}]", name);
 }
 
-/// The names of the first item sections whose number is above `count`, in file order.
-std::string namesBeyond(const KdxSection& node, std::string_view prefix, std::int32_t count) {
-  constexpr int kMostNames = 8;
-  std::string names;
-  int found = 0;
+/// The item sections whose number is above `count`, in file order; one whose number is too large to be read counts,
+/// too.
+std::vector<const KdxSection*> itemsBeyond(const KdxSection& node, std::string_view prefix, std::size_t count) {
+  std::vector<const KdxSection*> items;
   for (const auto& section : node.sections()) {
     const std::string_view name = section->name();
     if (!name.starts_with(prefix) || itemPattern(name) == name) continue;
     const auto number = parseInteger(name.substr(prefix.size()));
-    if ((number && *number <= count) || ++found > kMostNames) continue;
-    names += fmt::format("{}{}", names.empty() ? "" : ", ", name);
+    if (!number || static_cast<std::size_t>(*number) > count) items.push_back(section.get());
   }
-  return found > kMostNames ? names + ", ..." : names;
+  return items;
+}
+
+/// The names of the first of them.
+std::string namesBeyond(const KdxSection& node, std::string_view prefix, std::size_t count) {
+  constexpr std::size_t kMostNames = 8;
+  const std::vector<const KdxSection*> items = itemsBeyond(node, prefix, count);
+  std::string names;
+  for (std::size_t i = 0; i < std::min(items.size(), kMostNames); ++i) {
+    names += fmt::format("{}{}", i == 0 ? "" : ", ", items[i]->name());
+  }
+  return items.size() > kMostNames ? names + ", ..." : names;
 }
 
 /// What the keyword accepts, if a text without quotes was written for a coded value.
@@ -144,13 +153,7 @@ SetupSection::SetupSection(SetupFile& file, const KdxSection& node, std::string 
     : file_(&file), node_(&node), path_(std::move(path)), pattern_(std::move(pattern)) {}
 
 bool SetupSection::holds(std::string_view path) const {
-  const KdxSection* node = node_;
-  for (std::size_t from = 0; node != nullptr && from <= path.size();) {
-    const std::size_t end = std::min(path.find('/', from), path.size());
-    node = node->section(path.substr(from, end - from));
-    from = end + 1;
-  }
-  return node != nullptr;
+  return isThere(*node_, path);
 }
 
 std::optional<SetupSection> SetupSection::openIfPresent(std::string_view name) const {
@@ -195,14 +198,10 @@ SetupSection SetupSection::openItem(std::string_view prefix, std::size_t number)
 }
 
 std::optional<SetupSection> SetupSection::itemBeyond(std::string_view prefix, std::size_t count) const {
-  for (const auto& section : node_->sections()) {
-    const std::string& name = section->name();
-    if (!name.starts_with(prefix) || itemPattern(name) == name) continue;
-    const auto number = parseInteger(std::string_view(name).substr(prefix.size()));
-    if (number && static_cast<std::size_t>(*number) <= count) continue;
-    return SetupSection(*file_, *section, inside(path_, name), inside(pattern_, itemPattern(name)));
-  }
-  return std::nullopt;
+  const std::vector<const KdxSection*> items = itemsBeyond(*node_, prefix, count);
+  if (items.empty()) return std::nullopt;
+  const std::string& name = items.front()->name();
+  return SetupSection(*file_, *items.front(), inside(path_, name), inside(pattern_, itemPattern(name)));
 }
 
 std::string SetupSection::name() const {

@@ -8,6 +8,7 @@
 
 #include "common/fatal_error.h"
 #include "common/files.h"
+#include "common/replaceable_files.h"
 #include "common/run_files.h"
 #include "common/text.h"
 #include "common/utf8.h"

@@ -28,7 +28,7 @@ class FailedRunFile final {
                 std::vector<std::string> tableHead);
 
   const FailedRunPaths& paths() const { return paths_; }
-  /// Before the first failure: puts another file in the place of `calSimErr.dat`.
+  /// Before the first failure: writes another file and not `calSimErr.dat`.
   void describeIn(const std::string& pathForPeople) { paths_.forPeople = pathForPeople; }
 
   /// What an interrupted run has left of its failures.

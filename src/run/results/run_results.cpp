@@ -10,6 +10,7 @@
 #include "common/clock.h"
 #include "common/fatal_error.h"
 #include "common/files.h"
+#include "common/replaceable_files.h"
 #include "common/run_files.h"
 #include "common/text.h"
 #include "common/version.h"
@@ -94,18 +95,25 @@ void RunResults::open(const RunConfig& config, std::span<const ObservedSeries> o
   }
 }
 
+std::vector<std::pair<std::string, RunFile>> RunResults::statistics(const RunConfig& config) const {
+  std::vector<std::pair<std::string, RunFile>> files;
+  for (const RunFile& table : names_.tables) files.emplace_back(runFilePath(filePrefix_, table), table);
+  const std::size_t bandCount = config.task->report().hasBands ? config.measures.size() : 0;
+  for (std::size_t i = 1; i <= bandCount; ++i) {
+    files.emplace_back(runFilePath(filePrefix_, run_files::kBand, static_cast<int>(i)), run_files::kBand);
+  }
+  return files;
+}
+
 void RunResults::requireReplaceableFiles(const RunConfig& config) const {
   if (!config.task) return;
-  std::vector<RunFile> files{names_.results,     names_.restart,          names_.simulatedValues,
-                             names_.record,      names_.failures,         run_files::kSeries,
-                             run_files::kReport, run_files::kSavedFolder, run_files::kOwnFailedRuns};
-  files.insert(files.end(), names_.tables.begin(), names_.tables.end());
-  for (const RunFile& file : files) requireReplaceable(runFilePath(filePrefix_, file), file);
-  requireReplaceable(pathBeside(filePrefix_, run_files::kFailedRuns), run_files::kFailedRuns);
-  if (!config.task->report().hasBands) return;
-  for (int number = 1; number <= static_cast<int>(config.measures.size()); ++number) {
-    requireReplaceable(runFilePath(filePrefix_, run_files::kBand, number), run_files::kBand);
+  for (const RunFile& file :
+       {names_.results, names_.restart, names_.simulatedValues, names_.record, names_.failures, run_files::kSeries,
+        run_files::kReport, run_files::kSavedFolder, run_files::kOwnFailedRuns}) {
+    requireReplaceable(runFilePath(filePrefix_, file), file);
   }
+  requireReplaceable(pathBeside(filePrefix_, run_files::kFailedRuns), run_files::kFailedRuns);
+  for (const auto& [path, file] : statistics(config)) requireReplaceable(path, file);
 }
 
 /// `calSimErr.dat` is one per folder, and runs of several setups may be going on in it.
@@ -167,13 +175,8 @@ void RunResults::startAfresh(const RunConfig& config, RunLog& log) {
 }
 
 void RunResults::removeStatistics(const RunConfig& config) const {
-  std::vector<std::string> paths;
-  for (const RunFile& table : names_.tables) paths.push_back(runFilePath(filePrefix_, table));
-  for (int measure = 1; measure <= static_cast<int>(config.measures.size()); ++measure) {
-    paths.push_back(runFilePath(filePrefix_, run_files::kBand, measure));
-  }
   std::error_code ignored;
-  for (const std::string& path : paths) std::filesystem::remove(path, ignored);
+  for (const auto& [path, file] : statistics(config)) std::filesystem::remove(path, ignored);
 }
 
 void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggregator, RunLog& log) {

@@ -61,6 +61,8 @@ class RunResults final {
   void lockFailedRuns(RunLog& log);
   void startAfresh(const RunConfig& config, RunLog& log);
   void keepEarlierFiles(const RunConfig& config, RunLog& log) const;
+  /// The paths of what the task computes from its evaluations: tables, bands of its series.
+  std::vector<std::pair<std::string, RunFile>> statistics(const RunConfig& config) const;
   /// Those of an unfinished run do not count any more when it goes on, and can be computed again.
   void removeStatistics(const RunConfig& config) const;
   void goOn(const RunConfig& config, const ObjectiveAggregator& aggregator, RunLog& log);

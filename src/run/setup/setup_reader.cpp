@@ -48,7 +48,7 @@ class SetupReader final {
     readObjectiveFunctions();
     readSavedFiles();
     if (config_.task) {
-      config_.task->read({target_, config_.parameters, parameterSections_, config_.variableParameterCount(),
+      config_.task->read({target_, config_.parameters, sections_.parameters, config_.variableParameterCount(),
                           [this](bool hasInitialSample) { requireScales(hasInitialSample); }});
       for (std::size_t i = 0; i < config_.parameters.size(); ++i) {
         config_.parameters[i].givenValues = config_.task->givenValues(i);
@@ -56,9 +56,6 @@ class SetupReader final {
     }
     readSimultaneousSimulations();
     readMeasureFile();
-    sections_.parameterFiles = std::move(parameterFileSections_);
-    sections_.parameters = std::move(parameterSections_);
-    sections_.objectives = std::move(objectiveSections_);
     warnOfDoubtfulSettings(config_, sections_);
     config_.resultSettings = std::move(file_.resultSettings());
     return std::move(config_);
@@ -76,7 +73,7 @@ class SetupReader final {
   static void readReference(const SetupSection& section, const SettingSection<SeriesReference>& keywords,
                             SeriesReference& reference);
   void readSeries(const SetupSection& section, OutputMeasure& measure) const;
-  void connectMeasures(const std::vector<SetupSection>& measureSections);
+  void connectMeasures();
   void readSavedFiles();
   void readSimultaneousSimulations();
   void readMeasureFile();
@@ -85,10 +82,7 @@ class SetupReader final {
   SetupFile& file_;
   SetupSection target_;
   RunConfig config_;
-  std::vector<SetupSection> parameterFileSections_;
-  std::vector<SetupSection> parameterSections_;
-  std::vector<SetupSection> objectiveSections_;
-  SectionsRead sections_;                   ///< without those three
+  SectionsRead sections_;
   std::optional<EquationCheck> equations_;  ///< over the parameters, once they are read
 };
 
@@ -112,7 +106,7 @@ void SetupReader::readSimulationOption() {
                  "Error: No model parameter files defined",
                  [this](const SetupSection& opened, const ParameterFileItem& item) {
                    checkParameterFile(opened, item);
-                   parameterFileSections_.push_back(opened);
+                   sections_.parameterFiles.push_back(opened);
                  });
 }
 
@@ -179,15 +173,15 @@ void SetupReader::readModelParameters() {
   const SetupSection list = target_.open("MODEL_PARAMETERS");
   const std::size_t count = list.readCount("PARAMETER_");
   for (std::size_t i = 0; i < count; ++i) {
-    parameterSections_.push_back(list.openItem("PARAMETER_", i + 1));
+    sections_.parameters.push_back(list.openItem("PARAMETER_", i + 1));
     ModelParameter& parameter = config_.parameters.emplace_back();
-    if (const auto keyLines = parameterSections_.back().openIfPresent("Keywords")) {
+    if (const auto keyLines = sections_.parameters.back().openIfPresent("Keywords")) {
       keyLines->read(keyLinesSection(), parameter);
     }
   }
   NamesUsed names;
   for (std::size_t i = 0; i < count; ++i) {
-    const SetupSection& section = parameterSections_[i];
+    const SetupSection& section = sections_.parameters[i];
     section.echoName();
     section.read(parameterSection(), config_.parameters[i]);
     section.require(validateParameterDefinition(config_.parameters[i], names));
@@ -198,15 +192,15 @@ void SetupReader::readModelParameters() {
                 "expected a parameter with Parameter_Type = 0, found none");
   }
   equations_.emplace(config_.parameters);
-  equations_->checkDependentParameters(config_.parameters, parameterSections_);
+  equations_->checkDependentParameters(config_.parameters, sections_.parameters);
   checkTemplates();
 }
 
 /// Which parameters there are is known only after the templates' section was read.
 void SetupReader::checkTemplates() const {
-  for (std::size_t i = 0; i < parameterFileSections_.size(); ++i) {
-    parameterFileSections_[i].checkAt("TemplateFileName",
-                                      [&] { readTemplate(config_.parameterFiles[i], config_.parameters); });
+  for (std::size_t i = 0; i < sections_.parameterFiles.size(); ++i) {
+    sections_.parameterFiles[i].checkAt("TemplateFileName",
+                                        [&] { readTemplate(config_.parameterFiles[i], config_.parameters); });
   }
 }
 
@@ -224,23 +218,21 @@ void SetupReader::readObjectiveFunctions() {
   section.read(judgementSection(), config_);
   sections_.judgement = section;
 
-  std::vector<SetupSection> measureSections;
   section.open("OUTPUT_MEASURES")
       .readItems("MEASURE_", measureSection(), config_.measures, "Error: No output measures defined",
-                 [this, &measureSections](const SetupSection& opened, OutputMeasure& measure) {
+                 [this](const SetupSection& opened, OutputMeasure& measure) {
                    readSeries(opened, measure);
-                   measureSections.push_back(opened);
+                   sections_.measures.push_back(opened);
                  });
   NamesUsed names;
   section.open("OBJECTIVE_FUNCTIONS")
       .readItems(
           "OBJECTIVE_", objectiveSection(), config_.objectives, "Error: No objective functions defined",
-          [this](const SetupSection& opened, const ObjectiveFunction&) { objectiveSections_.push_back(opened); },
+          [this](const SetupSection& opened, const ObjectiveFunction&) { sections_.objectives.push_back(opened); },
           [&names](ObjectiveFunction& function) {
             return ObjectiveSection{function, names};
           });
-  connectMeasures(measureSections);
-  sections_.measures = std::move(measureSections);
+  connectMeasures();
   if (!config_.task || !config_.task->mayHaveInitialSample()) requireScales(false);
 }
 
@@ -280,7 +272,7 @@ void SetupReader::readSeries(const SetupSection& section, OutputMeasure& measure
 }
 
 /// Adds to each objective function the measures that name it.
-void SetupReader::connectMeasures(const std::vector<SetupSection>& measureSections) {
+void SetupReader::connectMeasures() {
   std::vector<std::string> names;
   std::unordered_map<std::string_view, std::size_t> byName;
   for (std::size_t i = 0; i < config_.objectives.size(); ++i) {
@@ -293,7 +285,7 @@ void SetupReader::connectMeasures(const std::vector<SetupSection>& measureSectio
     const auto found = byName.find(measure.functionName);
     if (found == byName.end()) {
       const auto nearest = nearestName(measure.functionName, names);
-      measureSections[i].refuse(
+      sections_.measures[i].refuse(
           "Error: Invalid function name for output measure " + measure.name, "Function_Name",
           fmt::format("no objective function is called {}{}", quotedForMessage(measure.functionName),
                       nearest ? fmt::format(", did you mean {}?", quotedForMessage(*nearest)) : ""));
@@ -303,13 +295,14 @@ void SetupReader::connectMeasures(const std::vector<SetupSection>& measureSectio
   }
   for (std::size_t i = 0; i < config_.objectives.size(); ++i) {
     if (!config_.objectives[i].measures.empty()) continue;
-    objectiveSections_[i].warn("Name", "no output measure has this Function_Name, the objective function is always 0");
+    sections_.objectives[i].warn("Name",
+                                 "no output measure has this Function_Name, the objective function is always 0");
   }
 }
 
 void SetupReader::requireScales(bool hasInitialSample) const {
   for (std::size_t i = 0; i < config_.objectives.size(); ++i) {
-    objectiveSections_[i].require(
+    sections_.objectives[i].require(
         validateTransformation(config_.objectives[i], config_.aggregationMethod, hasInitialSample));
   }
 }
