@@ -15,6 +15,7 @@
 #include "common/version.h"
 #include "run/results/record_file.h"
 #include "run/results/run_record.h"
+#include "run/results/shared_files.h"
 
 namespace mirevo {
 namespace {
@@ -94,12 +95,18 @@ void RunResults::open(const RunConfig& config, std::span<const ObservedSeries> o
   }
 }
 
+std::vector<RunFile> RunResults::dataFiles(const RunConfig& config) {
+  const ResultFileNames& names = namesOf(config);
+  std::vector<RunFile> files{names.results, names.restart,  names.simulatedValues,
+                             names.record,  names.failures, run_files::kSeries};
+  files.insert(files.end(), names.tables.begin(), names.tables.end());
+  return files;
+}
+
 void RunResults::requireReplaceableFiles(const RunConfig& config) const {
   if (!config.task) return;
-  std::vector<RunFile> files{names_.results,     names_.restart,          names_.simulatedValues,
-                             names_.record,      names_.failures,         run_files::kSeries,
-                             run_files::kReport, run_files::kSavedFolder, run_files::kOwnFailedRuns};
-  files.insert(files.end(), names_.tables.begin(), names_.tables.end());
+  std::vector<RunFile> files = dataFiles(config);
+  files.insert(files.end(), {run_files::kReport, run_files::kSavedFolder, run_files::kOwnFailedRuns});
   for (const RunFile& file : files) requireReplaceable(runFilePath(filePrefix_, file), file);
   requireReplaceable(pathBeside(filePrefix_, run_files::kFailedRuns), run_files::kFailedRuns);
   if (!config.task->report().hasBands) return;
@@ -141,13 +148,15 @@ void RunResults::writeTables(std::span<const DataTable> tables) const {
 
 void RunResults::keepEarlierFiles(const RunConfig& config, RunLog& log) const {
   keepEarlierFile(failedRuns_.paths().forPeople);
-  if (const std::string kept = keepEarlierFile(files_.results); !kept.empty()) {
+  if (const std::string kept = keepEarlierResults(files_.results, config.setupFile, log); !kept.empty()) {
     log.line("The results of the earlier run were kept as " + kept);
   }
   for (const std::string& path : {files_.settings, files_.simulatedValues, files_.record, files_.failures}) {
-    keepEarlierFile(path);
+    keepEarlierResults(path, config.setupFile, log);
   }
-  for (const RunFile& table : names_.tables) keepEarlierFile(runFilePath(filePrefix_, table));
+  for (const RunFile& table : names_.tables) {
+    keepEarlierResults(runFilePath(filePrefix_, table), config.setupFile, log);
+  }
   if (const std::string kept = keepEarlierFile(runFilePath(filePrefix_, run_files::kSavedFolder)); !kept.empty()) {
     log.line("The saved output files of the earlier run were kept as " + kept);
   }

@@ -39,6 +39,9 @@ class RunResults final {
   void open(const RunConfig& config, std::span<const ObservedSeries> observed, const ObjectiveAggregator& aggregator,
             RunLog& log);
 
+  /// The result files and tables of a run with this setup, and its series.
+  static std::vector<RunFile> dataFiles(const RunConfig& config);
+
   /// Throws FatalError if a file or folder that this run would write, rename or remove is not one of a run's.
   void requireReplaceableFiles(const RunConfig& config) const;
 
