@@ -38,6 +38,12 @@ TEST(Constraints, NearTheOptimumCostASearchNoEvaluation) {
       best = std::min(best, std::stod(row[6]));
     }
     EXPECT_LT(best, 0.2) << algorithm;
+    EXPECT_THAT(log, Not(HasSubstr("leave any width")));
+    // The initial set, a = 4 and b = 1, meets it.
+    folder.editSetup("'a + b'", "'abs(a - 4 * b)'");
+    folder.editSetup("'6.9'", "'0'");
+    ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0);
+    EXPECT_THAT(folder.read("basin.log"), HasSubstr("set already evaluated: do the constraints leave any width?"));
   }
 }
 

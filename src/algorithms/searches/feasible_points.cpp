@@ -102,8 +102,9 @@ bool FeasiblePoints::halve(ParameterSet& point, std::span<const double> origin, 
   return false;
 }
 
-ParameterSet FeasiblePoints::towards(ParameterSet point, std::span<const double> origin) const {
+ParameterSet FeasiblePoints::towards(ParameterSet point, std::span<const double> origin) {
   if (halve(point, origin, kMostHalvings)) return point;
+  ++returnedCount_;
   return {origin.begin(), origin.end()};
 }
 

@@ -62,7 +62,9 @@ TEST(FeasiblePoints, AreDrawnBackTowardsTheFirstOriginThatCanBeRun) {
   EXPECT_EQ(points.draw([] { return ParameterSet{9, 3}; }, inside), (ParameterSet{2.25, 2.25}));
   // Nothing on the way can be run.
   FeasiblePoints single(feasibleWhere([](const auto& set) { return set[0] == 0.0; }, "not 0"));
+  EXPECT_EQ(points.returnedCount(), 0);
   EXPECT_EQ(single.drawnBack({8, 8}, {inside}), inside);
+  EXPECT_EQ(single.returnedCount(), 1);
 }
 
 TEST(FeasiblePoints, RefuseASampleBeforeItIsEvaluatedWhereNoneCanBeFound) {
