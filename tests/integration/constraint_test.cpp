@@ -61,6 +61,18 @@ TEST(Constraints, TellOfASampleOfWhichTooManySetsViolateThemBeforeTheFirstRunAnd
                     Not(HasSubstr("model run error")), Not(HasSubstr("failed model run"))));
   EXPECT_THAT(folder.read("calSimErr.dat"), HasSubstr(" (parameter constraints violated)\n"));
 
+  // Hardly any set, and none.
+  for (const auto& [limit, redraws, said] :
+       {std::tuple{"'5.5'", true, " drawn, an acceptance rate of 0."}, {"'-1'", false, "None of the sets of the sample "}}) {
+    runConstrained(folder, settings, redraws);
+    folder.editSetup("'6.9'", limit);
+    run = runProgram({folder / "basin.kdx"});
+    EXPECT_EQ(run.exitCode, redraws ? 0 : 1);
+    EXPECT_THAT(folder.read("basin.log"), HasSubstr(said));
+    EXPECT_THAT(run.error, HasSubstr(redraws ? "The constraints leave less than 1 %" : said));
+    EXPECT_THAT(run.error, Not(HasSubstr("With Redraw_Infeasible = 1 in")));
+  }
+
   run = runConstrained(folder, settings, true);
   EXPECT_EQ(run.exitCode, 0);
   EXPECT_EQ(run.error, "");
