@@ -45,8 +45,16 @@ std::optional<std::string> headOf(const std::string& path, int& error) {
   return head;
 }
 
-/// Of a text that a full disk or a kill has cut off before the mark.
-bool isPartOfHead(std::string_view text) {
+constexpr std::string_view kReportHead =
+    "<!doctype html>\n<html lang=\"en\">\n<head>\n<meta charset=\"utf-8\">\n<meta "
+    "http-equiv=\"Content-Security-Policy\" content=\"default-src 'none'; script-src";
+
+/// Of a file that a full disk or a kill has cut off before the end of its mark.
+bool isPartOfHead(std::string_view text, const RunFile& file) {
+  using namespace run_files;
+  if (file == kLog && kLog.mark.starts_with(text)) return true;
+  if (file == kReport) return kReportHead.starts_with(text);
+  if (file.mark == kSimulatedMark) return text.empty() || kSimulatedMark.starts_with(text.substr(1));  // the version
   const auto lines = splitLines(text);
   return text.size() < kHeadLength &&
          std::all_of(lines.begin(), lines.end(), [](std::string_view line) { return line.starts_with("#"); });
@@ -125,7 +133,7 @@ std::string whyNotReplaceable(const std::string& path, const RunFile& file) {
     int error = 0;
     const auto head = headOf(path, error);
     if (!head) return unreadable(std::strerror(error));
-    isOfRun = !isFolder && (head->find(file.mark) != std::string::npos || isPartOfHead(*head));
+    isOfRun = !isFolder && (head->find(file.mark) != std::string::npos || isPartOfHead(*head, file));
   }
   return isOfRun ? std::string() : std::string(kOfAnother);
 }
