@@ -62,8 +62,8 @@ TEST(Constraints, TellOfASampleOfWhichTooManySetsViolateThemBeforeTheFirstRunAnd
   EXPECT_THAT(folder.read("calSimErr.dat"), HasSubstr(" (parameter constraints violated)\n"));
 
   // Hardly any set, and none.
-  for (const auto& [limit, redraws, said] :
-       {std::tuple{"'5.5'", true, " drawn, an acceptance rate of 0."}, {"'-1'", false, "None of the sets of the sample "}}) {
+  for (const auto& [limit, redraws, said] : {std::tuple{"'5.5'", true, " drawn, an acceptance rate of 0."},
+                                             {"'-1'", false, "None of the sets of the sample "}}) {
     runConstrained(folder, settings, redraws);
     folder.editSetup("'6.9'", limit);
     run = runProgram({folder / "basin.kdx"});

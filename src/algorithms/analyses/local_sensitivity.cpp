@@ -107,10 +107,9 @@ ParameterDifference planDifference(const Step& step, bool central, std::size_t j
     difference.minus = addSet(below);
   }
   if (oneSideIsViolated && (wantsBoth || goesUp != wantsUp)) {
-    difference.warnings.push_back(fmt::format("the step {} violates a constraint: the difference is {} ({})",
-                                              violationAbove ? "up" : "down",
-                                              central ? "one-sided" : "that of the other side",
-                                              violationAbove ? *violationAbove : *violationBelow));
+    difference.warnings.push_back(fmt::format(
+        "the step {} violates a constraint: the difference is {} ({})", violationAbove ? "up" : "down",
+        central ? "one-sided" : "that of the other side", violationAbove ? *violationAbove : *violationBelow));
   } else if (central && !difference.isCentral()) {
     difference.warnings.push_back(fmt::format("its {} bound leaves no room for the step: the difference is one-sided",
                                               difference.minus == 0 ? "lower" : "upper"));

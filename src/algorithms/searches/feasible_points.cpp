@@ -60,8 +60,7 @@ void FeasiblePoints::replaceInSample(std::vector<ParameterSet>& sample, std::siz
         "Error: No parameter set found that satisfies the constraints",
         fmt::format("{} sets drawn between the bounds cannot be run{}; one of them: {}",
                     unusable.size() + static_cast<std::size_t>(before - drawsLeft_),
-                    hasInitial ? ", nor can the initial values" : "",
-                    feasibility_.violation(last).value_or("")));
+                    hasInitial ? ", nor can the initial values" : "", feasibility_.violation(last).value_or("")));
   }
   for (const std::size_t i : remaining) sample[i] = towards(std::move(sample[i]), *known_);
   replacedCount_ += static_cast<int>(unusable.size());

@@ -71,9 +71,8 @@ bool RunMadeEntries::belongsToRunOf(std::string_view setup, std::string_view nam
   std::string_view rest = name;
   if (!takeText(rest, setup)) return false;
   const std::span<const RunFile> files = runFilesOfSetup();
-  return std::any_of(files.begin(), files.end(), [&](const RunFile& file) {
-    return matches(rest, file) && isMadeByRun(pathOf(name), file);
-  });
+  return std::any_of(files.begin(), files.end(),
+                     [&](const RunFile& file) { return matches(rest, file) && isMadeByRun(pathOf(name), file); });
 }
 
 std::string RunMadeEntries::pathOf(std::string_view name) const {

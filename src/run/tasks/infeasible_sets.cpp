@@ -34,7 +34,8 @@ void warnOfInfeasibleSets(const TaskContext& context, std::span<const ParameterS
     text += fmt::format("\n   The run will end before it is complete: at most {} may fail, a tenth of the {} planned",
                         limit, planned);
     if (!remedy.empty() && count == sets.size()) {
-      text += fmt::format("\n   None of the {} satisfies the constraints: are they meant, and the settings right?", what);
+      text +=
+          fmt::format("\n   None of the {} satisfies the constraints: are they meant, and the settings right?", what);
     } else if (!remedy.empty()) {
       text.append("\n   ").append(remedy);
     }

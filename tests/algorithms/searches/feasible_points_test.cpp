@@ -74,9 +74,10 @@ TEST(FeasiblePoints, RefuseASampleBeforeItIsEvaluatedWhereNoneCanBeFound) {
       refusalOf([&] { FeasiblePoints(sumBelow(-1)).replaceInSample(sample, 0, kBounds, random); }),
       "Error: No parameter set found that satisfies the constraints\n"
       "1000002 sets drawn between the bounds cannot be run, nor can the initial values; one of them: sum too large");
-  EXPECT_THAT(
-      refusalOf([&] { FeasiblePoints(sumBelow(-1)).replaceInSample(sample, 0, {{0, 0}, {10, 10}, {}}, random); }),
-      ::testing::EndsWith("1000002 sets drawn between the bounds cannot be run; one of them: sum too large"));
+  EXPECT_THAT(refusalOf([&] {
+                FeasiblePoints(sumBelow(-1)).replaceInSample(sample, 0, {{0, 0}, {10, 10}, {}}, random);
+              }),
+              ::testing::EndsWith("1000002 sets drawn between the bounds cannot be run; one of them: sum too large"));
   // The initial set, although it is not in the sample, is the only one known.
   FeasiblePoints tiny(sumBelow(1e-9));
   SearchBounds bounds = kBounds;

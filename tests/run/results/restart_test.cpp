@@ -173,7 +173,8 @@ TEST_F(EarlierRunTest, WithoutItsSettingsOrItsHeaderItIsRefused) {
   const RestartFiles files = restartFiles(folder_ / "setup", run_files::kOptimisation);
   const std::string settings = formatRestartSettings(restartSettings(config));
   const std::string damaged = "Evalu\tStatus\n" + row(1) + row(2);
-  const char* const kNoRuns = "setup_Optimisation.dat has no header row that can be read\nsetup_Optimisation.dat: It is not";
+  const char* const kNoRuns =
+      "setup_Optimisation.dat has no header row that can be read\nsetup_Optimisation.dat: It is not";
   // The results, the settings (no file when empty), what is said.
   const std::tuple<std::string, std::string, const char*> cases[] = {
       {std::string(kHeader) + row(1), "", "setup_Optimisation_Restart.dat"},
