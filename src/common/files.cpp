@@ -1,9 +1,11 @@
 #include "common/files.h"
 
+#include <algorithm>
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
 #include <fcntl.h>
+#include <limits>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -39,14 +41,8 @@ bool createAnew(const std::string& path, std::string_view content, std::optional
   return error == 0;
 }
 
-}  // namespace
-
-std::string faultOfFile(const std::string& path) {
-  struct stat status {};
-  return ::stat(path.c_str(), &status) == 0 ? faultOfKind(status) : std::strerror(errno);
-}
-
-std::optional<std::string> readTextFile(const std::string& path, std::string& reason) {
+/// The first `length` bytes of a file.
+std::optional<std::string> readBytes(const std::string& path, std::size_t length, std::string& reason) {
   // Without O_NONBLOCK the opening of a pipe would wait for its writer.
   const Descriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
   struct stat status {};
@@ -57,10 +53,10 @@ std::optional<std::string> readTextFile(const std::string& path, std::string& re
   reason = faultOfKind(status);
   if (!reason.empty()) return std::nullopt;
   std::string content;
-  content.resize(static_cast<std::size_t>(status.st_size));
+  content.resize(std::min(static_cast<std::size_t>(status.st_size), length));
   std::size_t size = 0;
-  while (true) {
-    if (size == content.size()) content.resize(content.size() + 65536);
+  while (size < length) {
+    if (size == content.size()) content.resize(std::min(content.size() + 65536, length));
     const ssize_t got = ::read(file.get(), content.data() + size, content.size() - size);
     if (got < 0) {
       if (errno == EINTR) continue;
@@ -72,6 +68,21 @@ std::optional<std::string> readTextFile(const std::string& path, std::string& re
   }
   content.resize(size);
   return content;
+}
+
+}  // namespace
+
+std::string faultOfFile(const std::string& path) {
+  struct stat status {};
+  return ::stat(path.c_str(), &status) == 0 ? faultOfKind(status) : std::strerror(errno);
+}
+
+std::optional<std::string> readTextFile(const std::string& path, std::string& reason) {
+  return readBytes(path, std::numeric_limits<std::size_t>::max(), reason);
+}
+
+std::optional<std::string> readFileHead(const std::string& path, std::string& reason) {
+  return readBytes(path, kFileHeadLength, reason);
 }
 
 std::optional<std::string> readFileIfThere(const std::string& path) {

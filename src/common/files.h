@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -13,6 +14,10 @@ std::string faultOfFile(const std::string& path);
 /// The whole content of a file; empty, with the system's reason in `reason` ("No such file or directory"), on failure.
 /// Folders, devices and pipes are refused like a file that cannot be read.
 std::optional<std::string> readTextFile(const std::string& path, std::string& reason);
+
+inline constexpr std::size_t kFileHeadLength = 16384;  ///< room for the mark of a result behind a long title
+/// The same of the first kFileHeadLength bytes.
+std::optional<std::string> readFileHead(const std::string& path, std::string& reason);
 
 /// The whole content of a file; empty if there is no such file. Throws FatalError, with the system's reason, if it
 /// exists but cannot be read: it must not be mistaken for a missing one.

@@ -1,42 +1,34 @@
 #include "common/replaceable_files.h"
 
 #include <algorithm>
-#include <cerrno>
-#include <cstring>
-#include <fcntl.h>
 #include <filesystem>
 #include <optional>
 #include <string_view>
 #include <system_error>
-#include <unistd.h>
 
 #include <fmt/core.h>
 
-#include "common/descriptor.h"
 #include "common/fatal_error.h"
+#include "common/files.h"
 #include "common/take_text.h"
 #include "common/text.h"
 
 namespace mirevo {
 namespace {
 
-constexpr std::size_t kHeadLength = 16384;  // room for a long title before the mark
+constexpr std::string_view kReportHead =
+    "<!doctype html>\n<html lang=\"en\">\n<head>\n<meta charset=\"utf-8\">\n<meta "
+    "http-equiv=\"Content-Security-Policy\" content=\"default-src 'none'; script-src";
 
-/// The beginning of the file; empty, with the system's error, where it cannot be read.
-std::optional<std::string> headOf(const std::string& path, int& error) {
-  const Descriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
-  std::string head(kHeadLength, '\0');
-  const ssize_t length = file.get() < 0 ? -1 : ::read(file.get(), head.data(), head.size());
-  error = errno;
-  if (length < 0) return std::nullopt;
-  head.resize(static_cast<std::size_t>(length));
-  return head;
-}
-
-/// Of a text that a full disk or a kill has cut off before the mark.
-bool isPartOfHead(std::string_view text) {
+/// Of a file that a full disk or a kill has cut off before the end of its mark.
+bool isPartOfHead(std::string_view text, const RunFile& file) {
+  using namespace run_files;
+  if (file == kLog && kLog.mark.starts_with(text)) return true;
+  if (file == kReport) return kReportHead.starts_with(text);
+  constexpr std::string_view kSimulatedMark = kPlain.simulatedValues.mark;
+  if (file.mark == kSimulatedMark) return text.empty() || kSimulatedMark.starts_with(text.substr(1));  // the version
   const auto lines = splitLines(text);
-  return text.size() < kHeadLength &&
+  return text.size() < kFileHeadLength &&
          std::all_of(lines.begin(), lines.end(), [](std::string_view line) { return line.starts_with("#"); });
 }
 
@@ -70,8 +62,8 @@ std::string unreadable(const std::string& reason) {
 }  // namespace
 
 bool carriesMark(const std::string& path, const RunFile& file) {
-  int error = 0;
-  return headOf(path, error).value_or(std::string()).find(file.mark) != std::string::npos;
+  std::string reason;
+  return readFileHead(path, reason).value_or(std::string()).find(file.mark) != std::string::npos;
 }
 
 std::string whyNotReplaceable(const std::string& path, const RunFile& file) {
@@ -87,10 +79,10 @@ std::string whyNotReplaceable(const std::string& path, const RunFile& file) {
     isOfRun = isFolder && isFolderOfRun(path, file, fault);
     if (!fault.empty()) return unreadable(fault);
   } else if (type == std::filesystem::file_type::regular) {
-    int error = 0;
-    const auto head = headOf(path, error);
-    if (!head) return unreadable(std::strerror(error));
-    isOfRun = !isFolder && (head->find(file.mark) != std::string::npos || isPartOfHead(*head));
+    std::string reason;
+    const auto head = readFileHead(path, reason);
+    if (!head) return unreadable(reason);
+    isOfRun = !isFolder && (head->find(file.mark) != std::string::npos || isPartOfHead(*head, file));
   }
   return isOfRun ? std::string() : std::string(kOfAnother);
 }

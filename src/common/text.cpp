@@ -127,14 +127,17 @@ std::optional<std::string> nearestName(std::string_view name, std::span<const st
   const std::size_t limit = std::max<std::size_t>(1, name.size() / 3);
   std::optional<std::string> nearest;
   std::size_t nearestDistance = limit + 1;
+  std::size_t nearestGap = 0;
   for (const std::string& candidate : candidates) {
     const std::size_t lengthGap =
         candidate.size() > name.size() ? candidate.size() - name.size() : name.size() - candidate.size();
-    if (lengthGap >= nearestDistance) continue;
-    if (const std::size_t distance = editDistance(name, candidate); distance < nearestDistance) {
-      nearest = candidate;
-      nearestDistance = distance;
-    }
+    if (lengthGap > nearestDistance) continue;
+    // Of equally near ones that of the same length: "=<" is "<=" rather than "<".
+    const std::size_t distance = editDistance(name, candidate);
+    if (distance > limit || std::pair(distance, lengthGap) >= std::pair(nearestDistance, nearestGap)) continue;
+    nearest = candidate;
+    nearestDistance = distance;
+    nearestGap = lengthGap;
   }
   return nearest;
 }

@@ -26,6 +26,7 @@
 #include "report/run_report.h"
 #include "run/job_end.h"
 #include "run/results/record_file.h"
+#include "run/results/shared_files.h"
 #include "run/run_model.h"
 #include "run/setup/setup_reader.h"
 #include "run/setup/setup_summary.h"
@@ -42,6 +43,16 @@ using progress::kNormalTermination;
 std::string environmentValue(const char* name) {
   const char* value = std::getenv(name);
   return value == nullptr ? std::string{} : std::string(value);
+}
+
+constexpr std::string_view kAnotherRun = "Error: Another run of this setup is in progress";
+
+/// Because of a run of `shorter`, whose files begin as those of `longer`, or the other way round.
+[[noreturn]] void failAsShared(const std::string& shorter, const std::string& longer, const std::string& holder) {
+  fatalError(kAnotherRun,
+             fmt::format("{0}.kdx and {1}.kdx have result files in common, {1}*, and a run{2} of one of them is going "
+                         "on. Wait for it, or run a copy under another name.",
+                         shorter, longer, holder));
 }
 
 }  // namespace
@@ -102,7 +113,9 @@ void RunDriver::openRun(const std::string& setupFileName) {
     fatalError("Error: Unable to open " + setup.file, fmt::format("{}; did you mean {}?", fault, meant));
   }
   if (!runLock_.take(runFilePath(filePrefix_, run_files::kRunLock), {}, kLockPatienceSeconds)) {
-    fatalError("Error: Another run of this setup is in progress",
+    const std::string sharing = runningPrefixThatShares(filePrefix_);
+    if (!sharing.empty()) failAsShared(sharing, filePrefix_, runLock_.holder());
+    fatalError(kAnotherRun,
                fmt::format("{}: another run{} writes the files {}*. Wait for it, or run a copy under another name.",
                            setup.file, runLock_.holder(), filePrefix_));
   }
@@ -137,6 +150,18 @@ void RunDriver::warn(std::string_view text) {
   showMessage(text, {}, MessageType::warning);
 }
 
+/// Where another setup of the folder is named after a result of this run, both would write that file.
+void RunDriver::lockSharedFiles() {
+  if (!config_.task) return;
+  for (const std::string& other : prefixesThatShare(filePrefix_, RunResults::dataFiles(config_))) {
+    FileLock& lock = sharedLocks_.emplace_back();
+    if (!lock.take(runFilePath(other, run_files::kRunLock), {}, kLockPatienceSeconds)) {
+      failAsShared(filePrefix_, other, lock.holder());
+    }
+    if (!lock.warning().empty()) warn(lock.warning());
+  }
+}
+
 /// The workers lock the process folders, each its own, on the machine where that is. The master, which begins earlier,
 /// finds out whether another run works in any of them and whether they can be locked.
 void RunDriver::lockProcessFoldersOfJob(const std::string& prefix) {
@@ -154,6 +179,7 @@ void RunDriver::buildModel() {
   parameters_ = std::make_unique<ParameterModel>(config_.parameters, config_.constraints);
   aggregator_ = std::make_unique<ObjectiveAggregator>(config_.objectives, config_.aggregationMethod);
   // Before the process folders are made, so that a run that cannot be continued changes nothing.
+  lockSharedFiles();
   results_.emplace(config_, parameters_->searchSpace(), filePrefix_);
   results_->requireReplaceableFiles(config_);
   if (config_.task) config_.task->continueFrom(results_->earlierSearches());
@@ -228,7 +254,7 @@ void RunDriver::putEarlierReportAside() {
 void RunDriver::openSeries() {
   const std::string path = runFilePath(filePrefix_, run_files::kSeries);
   const bool goesOn = results_->earlierEvaluations() != nullptr;
-  if (!goesOn) keepEarlierFile(path);
+  if (!goesOn) keepEarlierResults(path, config_.setupFile, state_.log);
   if (runner_->shownMeasures().empty()) return;
   RecordedSeries run;
   run.headLines = {

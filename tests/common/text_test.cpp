@@ -56,6 +56,9 @@ TEST(Text, SuggestsTheNearestNameAndNoFarOne) {
   EXPECT_EQ(nearestName("Ttle", names), "Title");
   EXPECT_EQ(nearestName("Weight", names), std::nullopt);
   EXPECT_EQ(nearestName("", names), std::nullopt);
+  const std::vector<std::string> operators = {"<", "<=", ">", ">="};
+  EXPECT_EQ(nearestName("=<", operators), "<=") << "as near as <, and as long";
+  EXPECT_EQ(nearestName("=>", operators), ">=");
 }
 
 TEST(Text, SplitsLinesAtEitherLineEnd) {

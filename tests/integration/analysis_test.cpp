@@ -260,15 +260,16 @@ TEST(Uncertainty, TheLogTellsTheDistributionOfEachParameterAndWarnsOfWhatIsHardl
   folder.editSetup("Upper_Bound = 5.0\n      Transformation_Type = 0",
                    "Upper_Bound = 2.0\n      Transformation_Type = 2");
   folder.editSetup("Standard_Deviation = 0.1\n    [/PARAMETER_2]",
-                   "Standard_Deviation = 0.75\n    [/PARAMETER_2]\n    [PARAMETER_3]\n    [/PARAMETER_3]");
+                   "Standard_Deviation = 1.25\n    [/PARAMETER_2]\n    [PARAMETER_3]\n    [/PARAMETER_3]");
   ASSERT_EQ(runProgram({setup}).exitCode, 0);
   const std::string log = folder.read("basin.log");
-  EXPECT_THAT(log,
-              HasSubstr("\n  PARAMETER_1: a, mean 5, standard deviation 0.5 of the natural logarithm; on the model "
-                        "scale median 148.413, 5 to 95 % from 65.2074 to 337.791\n"
-                        "  PARAMETER_2: b, mean 2, standard deviation 0.75; on the model scale 5 to 95 % from 0 to "
-                        "3\n    an integer: values drawn from 2 to below 3 become 2, so that half of the values are "
-                        "below 2; the mean to give for values around 2 is 2.5\n"));
+  EXPECT_THAT(
+      log, HasSubstr("\n  PARAMETER_1: a, mean 5, standard deviation 0.5 of the natural logarithm; on the model "
+                     "scale median 148.413, 5 to 95 % from 65.2074 to 337.791\n"
+                     "  PARAMETER_2: b, mean 2, standard deviation 1.25; on the model scale 5 to 95 % from 0 to "
+                     "4\n    an integer: values drawn from 2 to below 3 become 2, so that half of the values are "
+                     "below 2; the mean to give for values around 2 is 2.5; values below the lower bound are truncated "
+                     "upwards, towards it: those from above -1 to below 1 all become 0\n"));
   EXPECT_THAT(log, HasSubstr("Warning: Mean_Value of PARAMETER_1 (a) is 5, on the model scale 148.413: outside the "
                              "bounds 4 to 6; the mean of a logarithmic parameter is that of its natural logarithm, "
                              "ln(5) = 1.60944\n"));

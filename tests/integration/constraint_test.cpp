@@ -38,6 +38,12 @@ TEST(Constraints, NearTheOptimumCostASearchNoEvaluation) {
       best = std::min(best, std::stod(row[6]));
     }
     EXPECT_LT(best, 0.2) << algorithm;
+    EXPECT_THAT(log, Not(HasSubstr("leave any width")));
+    // The initial set, a = 4 and b = 1, meets it.
+    folder.editSetup("'a + b'", "'abs(a - 4 * b)'");
+    folder.editSetup("'6.9'", "'0'");
+    ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0);
+    EXPECT_THAT(folder.read("basin.log"), HasSubstr("set already evaluated: do the constraints leave any width?"));
   }
 }
 
@@ -54,6 +60,18 @@ TEST(Constraints, TellOfASampleOfWhichTooManySetsViolateThemBeforeTheFirstRunAnd
               AllOf(HasSubstr("\nfailed evaluations: 7, 7 of them not run as they violate the constraints; at most"),
                     Not(HasSubstr("model run error")), Not(HasSubstr("failed model run"))));
   EXPECT_THAT(folder.read("calSimErr.dat"), HasSubstr(" (parameter constraints violated)\n"));
+
+  // Hardly any set, and none.
+  for (const auto& [limit, redraws, said] : {std::tuple{"'5.5'", true, " drawn, an acceptance rate of 0."},
+                                             {"'-1'", false, "None of the sets of the sample "}}) {
+    runConstrained(folder, settings, redraws);
+    folder.editSetup("'6.9'", limit);
+    run = runProgram({folder / "basin.kdx"});
+    EXPECT_EQ(run.exitCode, redraws ? 0 : 1);
+    EXPECT_THAT(folder.read("basin.log"), HasSubstr(said));
+    EXPECT_THAT(run.error, HasSubstr(redraws ? "The constraints leave less than 1 %" : said));
+    EXPECT_THAT(run.error, Not(HasSubstr("With Redraw_Infeasible = 1 in")));
+  }
 
   run = runConstrained(folder, settings, true);
   EXPECT_EQ(run.exitCode, 0);

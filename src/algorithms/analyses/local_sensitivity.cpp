@@ -60,8 +60,16 @@ Step wantedStep(const SensitivitySettings& settings, const SearchSpace& space, s
   return step;
 }
 
+/// Why the base set with this value of parameter j cannot be run; empty if it can.
+std::optional<std::string> violationAt(double value, std::size_t j, ParameterSet base, const Feasibility& feasibility) {
+  if (!feasibility.isTested()) return std::nullopt;
+  base[j] = value;
+  return feasibility.violation(base);
+}
+
 /// Adds the sets that are needed for the difference with respect to parameter j.
-ParameterDifference planDifference(const Step& step, bool central, std::size_t j, std::vector<ParameterSet>& sets) {
+ParameterDifference planDifference(const Step& step, bool central, std::size_t j, const Feasibility& feasibility,
+                                   std::vector<ParameterSet>& sets) {
   const auto addSet = [&](double value) {
     sets.push_back(sets.front());
     sets.back()[j] = value;
@@ -81,15 +89,28 @@ ParameterDifference planDifference(const Step& step, bool central, std::size_t j
   }
   const bool fitsUp = step.up <= step.roomUp;
   const bool fitsDown = step.down <= step.roomDown;
-  if (central && fitsUp && fitsDown) {
-    difference.minus = addSet(x - step.down);
-    difference.plus = addSet(x + step.up);
-  } else if (fitsUp || (!fitsDown && step.roomUp >= step.roomDown && step.roomUp > 0.0)) {
-    difference.plus = addSet(x + std::min(step.up, step.roomUp));
+  const double above = x + std::min(step.up, step.roomUp);
+  const double below = x - std::min(step.down, step.roomDown);
+  const auto violationAbove = violationAt(above, j, sets.front(), feasibility);
+  const auto violationBelow = violationAt(below, j, sets.front(), feasibility);
+  const bool canChooseSide = step.roomUp > 0.0 && step.roomDown > 0.0;
+  const bool oneSideIsViolated = canChooseSide && violationAbove.has_value() != violationBelow.has_value();
+  const bool wantsBoth = central && fitsUp && fitsDown;
+  const bool wantsUp = fitsUp || (!fitsDown && step.roomUp >= step.roomDown && step.roomUp > 0.0);
+  const bool goesUp = oneSideIsViolated ? !violationAbove : wantsUp;
+  if (wantsBoth && !oneSideIsViolated) {
+    difference.minus = addSet(below);
+    difference.plus = addSet(above);
+  } else if (goesUp) {
+    difference.plus = addSet(above);
   } else {
-    difference.minus = addSet(x - std::min(step.down, step.roomDown));
+    difference.minus = addSet(below);
   }
-  if (central && !difference.isCentral()) {
+  if (oneSideIsViolated && (wantsBoth || goesUp != wantsUp)) {
+    difference.warnings.push_back(fmt::format(
+        "the step {} violates a constraint: the difference is {} ({})", violationAbove ? "up" : "down",
+        central ? "one-sided" : "that of the other side", violationAbove ? *violationAbove : *violationBelow));
+  } else if (central && !difference.isCentral()) {
     difference.warnings.push_back(fmt::format("its {} bound leaves no room for the step: the difference is one-sided",
                                               difference.minus == 0 ? "lower" : "upper"));
   }
@@ -283,12 +304,14 @@ const SettingSection<SensitivitySettings>& localSensitivitySection() {
 }
 
 PerturbationPlan planPerturbations(const SensitivitySettings& settings, const SearchSpace& space,
-                                   std::span<const double> base, std::span<const int> fieldWidths) {
+                                   std::span<const double> base, std::span<const int> fieldWidths,
+                                   const Feasibility& feasibility) {
   PerturbationPlan plan;
   plan.sets.emplace_back(base.begin(), base.end());
   for (std::size_t j = 0; j < space.size(); ++j) {
     const Step step = wantedStep(settings, space, base, j);
-    plan.differences.push_back(planDifference(step, settings.differencing == Differencing::central, j, plan.sets));
+    const bool isCentral = settings.differencing == Differencing::central;
+    plan.differences.push_back(planDifference(step, isCentral, j, feasibility, plan.sets));
     const int fieldWidth = j < fieldWidths.size() ? fieldWidths[j] : 0;
     if (fieldWidth == 0 || !plan.differences.back().problem.empty()) continue;
     takeWidthAsWritten(space, j, fieldWidth, plan.sets, plan.differences.back());
@@ -313,9 +336,9 @@ bool hasRoomForStep(const SensitivitySettings& settings, const SearchSpace& spac
 }
 
 LocalSensitivity localSensitivity(const SensitivitySettings& settings, const SearchSpace& space, Evaluator& evaluator,
-                                  std::span<const int> fieldWidths) {
+                                  std::span<const int> fieldWidths, const Feasibility& feasibility) {
   LocalSensitivity sensitivity;
-  sensitivity.plan = planPerturbations(settings, space, space.initial, fieldWidths);
+  sensitivity.plan = planPerturbations(settings, space, space.initial, fieldWidths, feasibility);
   sensitivity.results = evaluator.evaluateParameterSets(sensitivity.plan.sets, DispatchMode::task);
   noteFailures(sensitivity.plan, sensitivity.results);
   sensitivity.measures = tabulate(sensitivity.plan, sensitivity.results, &EvaluationResult::measureValues);

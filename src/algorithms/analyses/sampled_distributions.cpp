@@ -41,6 +41,15 @@ std::string integerLine(const SearchSpace& space, std::size_t j, double mean) {
       step, step + 1.0, half, step + 0.5);
 }
 
+/// Truncation is towards the lower bound, from either side of it; empty where hardly any value is below it.
+std::string belowBoundText(const SearchSpace& space, std::size_t j, double lowest) {
+  if (lowest >= space.lower[j]) return {};
+  return fmt::format(
+      "; values below the lower bound are truncated upwards, towards it: those from above {:.6g} to below {:.6g} all "
+      "become {:.6g}",
+      space.lower[j] - 1.0, space.lower[j] + 1.0, space.lower[j]);
+}
+
 }  // namespace
 
 std::vector<std::string> distributionLines(const UncertaintySettings& settings, const SearchSpace& space) {
@@ -56,7 +65,8 @@ std::vector<std::string> distributionLines(const UncertaintySettings& settings, 
     line += fmt::format("5 to 95 % from {:.6g} to {:.6g}", toModelScale(space, j, mean - kQuantile95 * deviation),
                         toModelScale(space, j, mean + kQuantile95 * deviation));
     lines.push_back(std::move(line));
-    if (isInteger(space, j)) lines.push_back(integerLine(space, j, mean));
+    if (!isInteger(space, j)) continue;
+    lines.push_back(integerLine(space, j, mean) + belowBoundText(space, j, mean - kQuantile95 * deviation));
   }
   return lines;
 }

@@ -112,6 +112,7 @@ void Dds::takeAsBest(const ParameterSet& set, EvaluationResult& result) {
 
 void Dds::checkBudget() {
   summary_.replacedCount = feasible_.replacedCount();
+  summary_.returnedCount = feasible_.returnedCount();
   if (summary_.evaluationCount >= maxEvaluations_) {
     summary_.terminationMessage = "Optimisation terminated: Maximum number of model evaluations reached";
   }
@@ -190,6 +191,11 @@ BoundSection DdsMethod::section() {
             .meaning = "Neighbourhood size r: standard deviation of a perturbation as a fraction of the "
                        "parameter's range."})}}};
   return {section, *this};
+}
+
+std::vector<SearchDoubt> DdsMethod::doubts() const {
+  if (settings.perturbation > 0.0) return {};
+  return {{"Perturbation_Parameter", "0 perturbs nothing: every candidate is the best start set again"}};
 }
 
 std::string_view DdsMethod::budgetRefusal() const {

@@ -82,6 +82,7 @@ class DdsMethod final : public SearchMethod {
  public:
   const SearchFacts& facts() const override;
   BoundSection section() override;
+  std::vector<SearchDoubt> doubts() const override;
   std::string_view budgetRefusal() const override;
   /// Random start points, unless it starts from the initial set.
   bool evaluatesSample(const InitialSampleSettings& sample) const override { return !sample.includeInitialParameters; }

@@ -41,7 +41,8 @@ void FeasiblePoints::replaceInSample(std::vector<ParameterSet>& sample, std::siz
       unusable.push_back(i);
     }
   }
-  if (bounds.initial.size() == bounds.size() && contain(bounds.initial)) noteAsKnown(bounds.initial);
+  const bool hasInitial = bounds.initial.size() == bounds.size();
+  if (hasInitial && contain(bounds.initial)) noteAsKnown(bounds.initial);
   const int before = drawsLeft_;
   std::vector<std::size_t> remaining;
   for (const std::size_t i : unusable) {
@@ -57,9 +58,9 @@ void FeasiblePoints::replaceInSample(std::vector<ParameterSet>& sample, std::siz
     const ParameterSet& last = sample.empty() ? bounds.initial : sample.back();
     fatalError(
         "Error: No parameter set found that satisfies the constraints",
-        fmt::format("{} sets drawn between the bounds cannot be run, nor can the initial values; one of them: {}",
+        fmt::format("{} sets drawn between the bounds cannot be run{}; one of them: {}",
                     unusable.size() + static_cast<std::size_t>(before - drawsLeft_),
-                    feasibility_.violation(last).value_or("")));
+                    hasInitial ? ", nor can the initial values" : "", feasibility_.violation(last).value_or("")));
   }
   for (const std::size_t i : remaining) sample[i] = towards(std::move(sample[i]), *known_);
   replacedCount_ += static_cast<int>(unusable.size());
@@ -102,8 +103,9 @@ bool FeasiblePoints::halve(ParameterSet& point, std::span<const double> origin, 
   return false;
 }
 
-ParameterSet FeasiblePoints::towards(ParameterSet point, std::span<const double> origin) const {
+ParameterSet FeasiblePoints::towards(ParameterSet point, std::span<const double> origin) {
   if (halve(point, origin, kMostHalvings)) return point;
+  ++returnedCount_;
   return {origin.begin(), origin.end()};
 }
 

@@ -45,6 +45,9 @@ class FeasiblePoints final {
   /// Points that were replaced; one that was drawn or shortened many times counts once.
   int replacedCount() const { return replacedCount_; }
 
+  /// Those of them that ended at the point towards which they were drawn back, a set evaluated or to be evaluated.
+  int returnedCount() const { return returnedCount_; }
+
   static constexpr int kMostSampleDraws = 10'000;
   static constexpr int kMostRedraws = 100;
   static constexpr int kMostHalvings = 20;
@@ -54,13 +57,14 @@ class FeasiblePoints final {
   std::optional<ParameterSet> drawWithin(const SearchBounds& bounds, UniformGenerator& random);
   /// Halves the distance of the point to `origin` until it can be run; false if it still cannot.
   bool halve(ParameterSet& point, std::span<const double> origin, int mostHalvings) const;
-  ParameterSet towards(ParameterSet point, std::span<const double> origin) const;
+  ParameterSet towards(ParameterSet point, std::span<const double> origin);
   void noteAsKnown(const ParameterSet& point);
 
   Feasibility feasibility_;
   std::optional<ParameterSet> known_;  ///< a point that can be run
   int drawsLeft_ = 1'000'000;          ///< for initial samples, so that a large one does not draw for hours
   int replacedCount_ = 0;
+  int returnedCount_ = 0;
 };
 
 }  // namespace mirevo

@@ -59,6 +59,7 @@ void PopulationSearch::noteLoop() {
   summary_.populationSpread = populationSpread(population_, static_cast<int>(problem_.bounds.size()));
   summary_.populationRange = normalisedPopulationRange(population_, problem_.bounds);
   summary_.replacedCount = feasible_.replacedCount();
+  summary_.returnedCount = feasible_.returnedCount();
   const Individual& best = population_.front();
   if (summary_.best.empty() || isBetter(best.value(), summary_.bestResult.aggregate)) {
     summary_.best = best.set;

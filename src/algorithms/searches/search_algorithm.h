@@ -21,6 +21,7 @@ struct SearchSummary {
   int evaluationCount = 0;  ///< model evaluations made, failed ones included
   int loopCount = 0;
   int replacedCount = 0;           ///< proposals that could not be run and were replaced before their evaluation
+  int returnedCount = 0;           ///< those of them that could only be replaced by a set already evaluated
   double populationSpread = 0.0;   ///< search scale; populationSpread() of a search with a population
   double populationRange = 0.0;    ///< normalisedPopulationRange() of a search with a population
   std::string terminationMessage;  ///< empty while it runs

@@ -36,6 +36,12 @@ struct SearchAdvice {
   std::int64_t advised = 0;  ///< the least value advised
 };
 
+/// A setting with which the search has nothing to search for.
+struct SearchDoubt {
+  std::string_view keyword;
+  std::string_view text;
+};
+
 /// A search that was interrupted or ended, and is to be continued with a raised budget.
 struct SearchHistory {
   int budget = 0;                       ///< Max_No_Evaluations then
@@ -66,6 +72,8 @@ class SearchMethod {
   virtual BoundSection section() = 0;
   /// Settings that are small for n variable parameters.
   virtual std::vector<SearchAdvice> advice(std::size_t /*n*/) const { return {}; }
+  /// Settings that are valid and of which it is certain that they make the search pointless.
+  virtual std::vector<SearchDoubt> doubts() const { return {}; }
   /// The fixed text for a budget below 1, if the search has one of its own.
   virtual std::string_view budgetRefusal() const { return {}; }
   /// Whether it evaluates a sample from which the scale of the objective functions can be determined.

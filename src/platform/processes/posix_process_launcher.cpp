@@ -148,14 +148,14 @@ bool PosixProcessLauncher::initialise(const LauncherSettings& settings) {
       arguments.push_back(std::move(*words));
     }
     nullInput_ = openAboveStandard("/dev/null", O_RDONLY, 0);
-    if (nullInput_ < 0) fatalError(fmt::format("Unable to open /dev/null: {}", std::strerror(errno)));
+    if (nullInput_ < 0) fatalError(fmt::format("Error: Unable to open /dev/null: {}", std::strerror(errno)));
     prepareEnvironment(settings.useSingleThread);
     groups_ = std::make_unique<ProcessGroupTable>(settings.slotCount);
     groups_->makeCurrent();
     guard_ = std::make_unique<ChildGuard>();
     std::string reason;
     if (!guard_->start(*groups_, mark_, reason))
-      fatalError("Unable to start the guard of the model's processes: " + reason);
+      fatalError("Error: Unable to start the guard of the model's processes: " + reason);
     lockFolders(settings);
     slots_.reserve(static_cast<std::size_t>(settings.slotCount));
     for (int number = 1; number <= settings.slotCount; ++number) {

@@ -1,7 +1,9 @@
 #include "platform/processes/run_made_entries.h"
 
 #include <algorithm>
+#include <filesystem>
 #include <sys/stat.h>
+#include <system_error>
 #include <utility>
 
 #include "common/files.h"
@@ -22,6 +24,15 @@ bool matches(std::string_view text, const RunFile& file) {
   if (!takeText(text, file.stem) || (file.isNumbered && takeDigits(text).empty())) return false;
   if (text == file.extension) return true;
   return takeText(text, ".") && !takeDigits(text).empty() && text == file.extension;
+}
+
+/// Whether the content is that of a run's file, too. A link is followed: a run makes none.
+bool isMadeByRun(const std::string& path, const RunFile& file) {
+  // An empty file of so plain a name may be the model's.
+  if (file.mayBeModels && !path.ends_with(kTemporaryEnding)) return carriesMark(path, file);
+  std::error_code failed;
+  const std::string target = std::filesystem::canonical(path, failed).string();
+  return whyNotReplaceable(failed ? path : target, file).empty();
 }
 
 /// Whether this is a process folder of a setup in another folder, or the lock on such folders.
@@ -50,20 +61,22 @@ RunMadeEntries::RunMadeEntries(std::string folder, std::span<const std::string> 
 
 bool RunMadeEntries::contains(std::string_view name) const {
   for (const RunFile& file : {run_files::kFailedRuns, run_files::kFailedRunsLock}) {
-    if (!setups_.empty() && matches(name, file)) return true;
+    if (!setups_.empty() && matches(name, file) && isMadeByRun(pathOf(name), file)) return true;
   }
   const auto owns = [&](const std::string& setup) { return belongsToRunOf(setup, name); };
-  return std::any_of(setups_.begin(), setups_.end(), owns) || isProcessFolder(folder_ + "/" + std::string(name));
+  return std::any_of(setups_.begin(), setups_.end(), owns) || isProcessFolder(pathOf(name));
 }
 
 bool RunMadeEntries::belongsToRunOf(std::string_view setup, std::string_view name) const {
   std::string_view rest = name;
   if (!takeText(rest, setup)) return false;
   const std::span<const RunFile> files = runFilesOfSetup();
-  const auto file =
-      std::find_if(files.begin(), files.end(), [rest](const RunFile& each) { return matches(rest, each); });
-  if (file == files.end()) return false;
-  return !file->mayBeModels || carriesMark(folder_ + "/" + std::string(name), *file);
+  return std::any_of(files.begin(), files.end(),
+                     [&](const RunFile& file) { return matches(rest, file) && isMadeByRun(pathOf(name), file); });
+}
+
+std::string RunMadeEntries::pathOf(std::string_view name) const {
+  return std::string(folder_).append("/").append(name);
 }
 
 }  // namespace mirevo

@@ -19,6 +19,7 @@ class RunMadeEntries final {
 
  private:
   bool belongsToRunOf(std::string_view setup, std::string_view name) const;
+  std::string pathOf(std::string_view name) const;
 
   std::string folder_;
   std::vector<std::string> setups_;  ///< names without ".kdx"

@@ -9,6 +9,7 @@
 
 #include "common/fatal_error.h"
 #include "common/files.h"
+#include "common/replaceable_files.h"
 #include "common/run_files.h"
 #include "run/results/restart_settings.h"
 
@@ -23,13 +24,24 @@ constexpr std::size_t kMostChangesShown = 20;
   fatalError(kRefusal, fmt::format("{}\n{}", detail, kRemedy));
 }
 
+/// Because of a file, which may be none of a run's: then a fresh start would be refused, too.
+[[noreturn]] void refuse(std::string_view detail, const std::string& path, const RunFile& file) {
+  const std::string why = whyNotReplaceable(path, file);
+  if (why.empty()) refuse(detail);
+  fatalError(kRefusal, fmt::format("{}\n{}: {}", detail, path, why));
+}
+
 RestartSettings readSettings(const std::string& path) {
   std::string reason;
   const auto text = readTextFile(path, reason);
   if (!text)
-    refuse(fmt::format("{}: {}: with what settings the earlier results were computed is not known", path, reason));
+    refuse(fmt::format("{}: {}: with what settings the earlier results were computed is not known", path, reason), path,
+           run_files::kPlain.restart);
   auto settings = parseRestartSettings(*text);
-  if (!settings) refuse(fmt::format("{} is damaged: with what settings the results were computed is not known", path));
+  if (!settings) {
+    refuse(fmt::format("{} is damaged: with what settings the results were computed is not known", path), path,
+           run_files::kPlain.restart);
+  }
   return *std::move(settings);
 }
 
@@ -82,12 +94,16 @@ std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunCon
   const auto text = readFileIfThere(files.results);
   ResultTable table = readResultTable(text.value_or(""), columns);
   // Not just a cut-off beginning: there may be days of work below a damaged header row.
-  if (!table.hasHeader && table.unusableLines > 1) refuse(files.results + " has no header row that can be read");
+  if (!table.hasHeader && table.unusableLines > 1) {
+    refuse(files.results + " has no header row that can be read", files.results, run_files::kPlain.results);
+  }
   if (table.rows.empty() && table.rowsOfOtherColumns == 0) return std::nullopt;
   const RestartSettings then = readSettings(files.settings);
   const RestartSettings now = restartSettings(config);
   requireSameSettings(then, now);
-  if (!table.hasExpectedCount) refuse(files.results + " has other columns than the setup asks for");
+  if (!table.hasExpectedCount) {
+    refuse(files.results + " has other columns than the setup asks for", files.results, run_files::kPlain.results);
+  }
 
   if (!record) record = recordOfEarlierVersion(table);
   EarlierRun run{std::move(table.rows), std::move(record->started), std::move(record->restarted), then.searches, {}};

@@ -16,6 +16,7 @@
 #include "common/version.h"
 #include "run/results/record_file.h"
 #include "run/results/run_record.h"
+#include "run/results/shared_files.h"
 
 namespace mirevo {
 namespace {
@@ -95,25 +96,28 @@ void RunResults::open(const RunConfig& config, std::span<const ObservedSeries> o
   }
 }
 
-std::vector<std::pair<std::string, RunFile>> RunResults::statistics(const RunConfig& config) const {
-  std::vector<std::pair<std::string, RunFile>> files;
-  for (const RunFile& table : names_.tables) files.emplace_back(runFilePath(filePrefix_, table), table);
-  const std::size_t bandCount = config.task->report().hasBands ? config.measures.size() : 0;
-  for (std::size_t i = 1; i <= bandCount; ++i) {
-    files.emplace_back(runFilePath(filePrefix_, run_files::kBand, static_cast<int>(i)), run_files::kBand);
-  }
+std::vector<std::string> RunResults::bandPaths(const RunConfig& config) const {
+  std::vector<std::string> paths(config.task->report().hasBands ? config.measures.size() : 0);
+  int number = 0;
+  for (std::string& path : paths) path = runFilePath(filePrefix_, run_files::kBand, ++number);
+  return paths;
+}
+
+std::vector<RunFile> RunResults::dataFiles(const RunConfig& config) {
+  const ResultFileNames& names = namesOf(config);
+  std::vector<RunFile> files{names.results, names.restart,  names.simulatedValues,
+                             names.record,  names.failures, run_files::kSeries};
+  files.insert(files.end(), names.tables.begin(), names.tables.end());
   return files;
 }
 
 void RunResults::requireReplaceableFiles(const RunConfig& config) const {
   if (!config.task) return;
-  for (const RunFile& file :
-       {names_.results, names_.restart, names_.simulatedValues, names_.record, names_.failures, run_files::kSeries,
-        run_files::kReport, run_files::kSavedFolder, run_files::kOwnFailedRuns}) {
-    requireReplaceable(runFilePath(filePrefix_, file), file);
-  }
+  std::vector<RunFile> files = dataFiles(config);
+  files.insert(files.end(), {run_files::kReport, run_files::kSavedFolder, run_files::kOwnFailedRuns});
+  for (const RunFile& file : files) requireReplaceable(runFilePath(filePrefix_, file), file);
   requireReplaceable(pathBeside(filePrefix_, run_files::kFailedRuns), run_files::kFailedRuns);
-  for (const auto& [path, file] : statistics(config)) requireReplaceable(path, file);
+  for (const std::string& path : bandPaths(config)) requireReplaceable(path, run_files::kBand);
 }
 
 /// `calSimErr.dat` is one per folder, and runs of several setups may be going on in it.
@@ -149,13 +153,15 @@ void RunResults::writeTables(std::span<const DataTable> tables) const {
 
 void RunResults::keepEarlierFiles(const RunConfig& config, RunLog& log) const {
   keepEarlierFile(failedRuns_.paths().forPeople);
-  if (const std::string kept = keepEarlierFile(files_.results); !kept.empty()) {
+  if (const std::string kept = keepEarlierResults(files_.results, config.setupFile, log); !kept.empty()) {
     log.line("The results of the earlier run were kept as " + kept);
   }
   for (const std::string& path : {files_.settings, files_.simulatedValues, files_.record, files_.failures}) {
-    keepEarlierFile(path);
+    keepEarlierResults(path, config.setupFile, log);
   }
-  for (const RunFile& table : names_.tables) keepEarlierFile(runFilePath(filePrefix_, table));
+  for (const RunFile& table : names_.tables) {
+    keepEarlierResults(runFilePath(filePrefix_, table), config.setupFile, log);
+  }
   if (const std::string kept = keepEarlierFile(runFilePath(filePrefix_, run_files::kSavedFolder)); !kept.empty()) {
     log.line("The saved output files of the earlier run were kept as " + kept);
   }
@@ -176,7 +182,8 @@ void RunResults::startAfresh(const RunConfig& config, RunLog& log) {
 
 void RunResults::removeStatistics(const RunConfig& config) const {
   std::error_code ignored;
-  for (const auto& [path, file] : statistics(config)) std::filesystem::remove(path, ignored);
+  for (const RunFile& table : names_.tables) std::filesystem::remove(runFilePath(filePrefix_, table), ignored);
+  for (const std::string& path : bandPaths(config)) std::filesystem::remove(path, ignored);
 }
 
 void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggregator, RunLog& log) {

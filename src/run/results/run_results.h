@@ -39,6 +39,9 @@ class RunResults final {
   void open(const RunConfig& config, std::span<const ObservedSeries> observed, const ObjectiveAggregator& aggregator,
             RunLog& log);
 
+  /// The result files and tables of a run with this setup, and its series.
+  static std::vector<RunFile> dataFiles(const RunConfig& config);
+
   /// Throws FatalError if a file or folder that this run would write, rename or remove is not one of a run's.
   void requireReplaceableFiles(const RunConfig& config) const;
 
@@ -61,8 +64,7 @@ class RunResults final {
   void lockFailedRuns(RunLog& log);
   void startAfresh(const RunConfig& config, RunLog& log);
   void keepEarlierFiles(const RunConfig& config, RunLog& log) const;
-  /// The paths of what the task computes from its evaluations: tables, bands of its series.
-  std::vector<std::pair<std::string, RunFile>> statistics(const RunConfig& config) const;
+  std::vector<std::string> bandPaths(const RunConfig& config) const;
   /// Those of an unfinished run do not count any more when it goes on, and can be computed again.
   void removeStatistics(const RunConfig& config) const;
   void goOn(const RunConfig& config, const ObjectiveAggregator& aggregator, RunLog& log);

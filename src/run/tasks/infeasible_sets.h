@@ -10,7 +10,8 @@ namespace mirevo {
 
 /// Warns, before the first model run, of sets that will be evaluated although they cannot be run, with their numbers.
 /// If more of them than may fail are among `planned` evaluations, the user is told, too. `sets` are the first
-/// evaluations of the run, `what` they are called: "scenarios". `remedy` is one more sentence for the user, or empty.
+/// evaluations of the run, `what` they are called: "scenarios". `remedy` is one more sentence for the user
+/// where some of the sets can be run, or empty.
 void warnOfInfeasibleSets(const TaskContext& context, std::span<const ParameterSet> sets, std::string_view what,
                           int planned, std::string_view remedy = {});
 

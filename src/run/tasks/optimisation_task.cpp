@@ -65,6 +65,20 @@ void logValues(RunLog& log, std::string_view heading, std::span<const std::strin
   }
 }
 
+/// Where most of a search is one set again and again: constraints with two equal sides, or bounds that they meet.
+/// A population of equal points proposes nothing else, so that only those of its sample count.
+void warnOfNoWidth(const TaskContext& context, const SearchSummary& summary, std::int64_t populationSize) {
+  const std::int64_t returned = 2 * std::int64_t{summary.returnedCount};
+  const std::int64_t proposed =
+      populationSize > 0 ? std::min<std::int64_t>(populationSize, summary.evaluationCount) : summary.evaluationCount;
+  if (returned == 0 || returned < proposed || returned < summary.replacedCount) return;
+  context.log.warning(
+      fmt::format("{} of {} points that violated a constraint could only be replaced by a set already evaluated: do "
+                  "the constraints leave any width? A parameter that must equal an expression of others is one with "
+                  "Parameter_Type = 2",
+                  summary.returnedCount, summary.replacedCount));
+}
+
 void logBestSet(const TaskContext& context, const ParameterSet& best, const EvaluationResult& result) {
   std::vector<std::string> objectives;
   for (const ObjectiveFunction& objective : context.objectives) objectives.push_back(objective.name);
@@ -122,6 +136,13 @@ void OptimisationTask::readMethod(const TaskReading& reading, const SetupSection
     control.warn(advice.keyword, fmt::format("found {}, at least {} are advised for the number of variable parameters",
                                              advice.found, advice.advised));
   }
+  for (const SearchDoubt& doubt : method->doubts()) control.warn(doubt.keyword, doubt.text);
+}
+
+void OptimisationTask::warnOfOneLoop(const SetupSection& section) const {
+  // Then a value is compared with itself.
+  if (method->populationSize() == 0 || stopping.loopsConvergence != 1 || !(stopping.minChange > 0.0)) return;
+  section.warn("No_Loops_Convergence", "with 1 the search ends after its first loop, use at least 2");
 }
 
 void OptimisationTask::readStopping(const SetupSection& section) {
@@ -131,6 +152,7 @@ void OptimisationTask::readStopping(const SetupSection& section) {
     section.refuse(refusal, kBudgetKeyword, fmt::format("expected 1 or more, found {}", stopping.maxEvaluations));
   }
   section.check(bound);
+  warnOfOneLoop(section);
   const std::int64_t sampleSize = method->populationSize();
   if (sampleSize <= stopping.maxEvaluations) return;
   section.warn(kBudgetKeyword, fmt::format("the initial sample of {} sets is cut to {}, and no search follows",
@@ -220,6 +242,7 @@ TaskOutcome OptimisationTask::run(const TaskContext& context) {
         fmt::format("Proposed points that violated a constraint and were replaced before their evaluation: {}",
                     summary.replacedCount));
   }
+  warnOfNoWidth(context, summary, method->populationSize());
   const std::vector<ParameterSet> best{summary.best};
   if (best.front().empty()) return {summary.terminationMessage};
   if (context.searchEnded) context.searchEnded(summary);

@@ -41,6 +41,7 @@ class OptimisationTask final : public Task {
   bool usesSurrogate() const { return surrogateUse == SurrogateUse::yes && method->facts().usesSurrogate; }
   void readMethod(const TaskReading& reading, const SetupSection& section) const;
   void readStopping(const SetupSection& section);
+  void warnOfOneLoop(const SetupSection& section) const;
   void readSurrogate(const TaskReading& reading, const SetupSection& section, const SetupSection& stoppingSection);
   void warnOfGivenSets(const TaskContext& context, const SearchProblem& problem) const;
   SearchSummary search(const TaskContext& context) const;

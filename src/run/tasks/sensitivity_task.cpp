@@ -175,7 +175,7 @@ int SensitivityTask::plannedEvaluations(std::size_t variableCount) const {
 TaskOutcome SensitivityTask::outcomeOf(const TaskContext& context, Evaluator& evaluator) const {
   TaskOutcome outcome{std::string(kEndOfTask)};
   const std::vector<int> fieldWidths = ofVariableParameters(context.fieldWidths, context.parameters);
-  LocalSensitivity sensitivity = localSensitivity(settings, context.space, evaluator, fieldWidths);
+  LocalSensitivity sensitivity = localSensitivity(settings, context.space, evaluator, fieldWidths, context.feasibility);
   Linearised found;
   if (settings.calculatesCovariance) found = linearised(context, sensitivity);
   if (found.model) takeObservations(*found.model, sensitivity);

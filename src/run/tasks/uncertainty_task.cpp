@@ -96,11 +96,16 @@ std::vector<ParameterSet> UncertaintyTask::drawSample(const TaskContext& context
     return sample;
   }
   FeasibleSample sample = feasibleUncertaintySample(settings, randomSeed, context.feasibility, messages);
-  const auto kept = static_cast<double>(sample.sets.size());
-  acceptance =
-      fmt::format("Redraw_Infeasible: {} sets that can be run out of {} drawn, an acceptance rate of {:.1f} %",
-                  sample.sets.size(), sample.drawnCount, 100.0 * kept / static_cast<double>(sample.drawnCount));
+  const double rate = 100.0 * static_cast<double>(sample.sets.size()) / static_cast<double>(sample.drawnCount);
+  acceptance = fmt::format("Redraw_Infeasible: {} sets that can be run out of {} drawn, an acceptance rate of {} %",
+                           sample.sets.size(), sample.drawnCount,
+                           rate < 1.0 ? fmt::format("{:.2g}", rate) : fmt::format("{:.1f}", rate));
   context.log.line(acceptance);
+  if (rate < 1.0) {
+    context.log.warning(
+        "The constraints leave less than 1 % of the sets drawn: the distributions of those that can be "
+        "run may have little in common with the ones requested. Are means and constraints right?");
+  }
   return std::move(sample.sets);
 }
 

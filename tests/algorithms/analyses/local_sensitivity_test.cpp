@@ -81,6 +81,35 @@ TEST(PlanPerturbations, TakesItsStepsInsideTheBounds) {
   }
 }
 
+TEST(PlanPerturbations, TakesTheOtherSideOfAConstraint) {
+  const SearchSpace space = spaceOf({{kNone, 2, 0, 10}});
+  // The largest and the least value that can be run; minus, plus and the warning, empty for none.
+  const std::tuple<SensitivitySettings, double, double, double, double, std::string> cases[] = {
+      {{kForward, kOfRange, 0.1},
+       2.5,
+       0,
+       1,
+       2,
+       "the step up violates a constraint: the difference is that of the other"},
+      {{kForward, kOfRange, 0.1}, 10, 1.5, 2, 3, ""},
+      {{kCentral, kOfRange, 0.1}, 2.5, 0, 1, 2, "the step up violates a constraint: the difference is one-sided (no)"},
+      {{kCentral, kOfRange, 0.1},
+       10,
+       1.5,
+       2,
+       3,
+       "the step down violates a constraint: the difference is one-sided (no)"},
+      {{kCentral, kOfRange, 0.1}, 2.5, 1.5, 1, 3, ""}};  // neither can be run, and both fail
+  for (const auto& [settings, most, least, minus, plus, warning] : cases) {
+    const auto feasibility = feasibleWhere([&](const auto& x) { return x[0] <= most && x[0] >= least; }, "no");
+    const PerturbationPlan plan = planPerturbations(settings, space, space.initial, {}, feasibility);
+    EXPECT_EQ(plan.sets[plan.differences[0].minus][0], minus);
+    EXPECT_EQ(plan.sets[plan.differences[0].plus][0], plus);
+    ASSERT_EQ(plan.differences[0].warnings.empty(), warning.empty());
+    for (const std::string& text : plan.differences[0].warnings) EXPECT_THAT(text, ::testing::StartsWith(warning));
+  }
+}
+
 TEST(PlanPerturbations, NamesWhatHasASingleValueAndAStepThatRoundsAway) {
   // The integer's bounds may be 3 and 3.5: the space has the largest value and 1.
   const SearchSpace space = spaceOf({{kNone, 3, 3, 3}, {kInteger, 3, 3, 4}, {kNone, 1e18, 0, 2e18}});

@@ -62,7 +62,9 @@ TEST(FeasiblePoints, AreDrawnBackTowardsTheFirstOriginThatCanBeRun) {
   EXPECT_EQ(points.draw([] { return ParameterSet{9, 3}; }, inside), (ParameterSet{2.25, 2.25}));
   // Nothing on the way can be run.
   FeasiblePoints single(feasibleWhere([](const auto& set) { return set[0] == 0.0; }, "not 0"));
+  EXPECT_EQ(points.returnedCount(), 0);
   EXPECT_EQ(single.drawnBack({8, 8}, {inside}), inside);
+  EXPECT_EQ(single.returnedCount(), 1);
 }
 
 TEST(FeasiblePoints, RefuseASampleBeforeItIsEvaluatedWhereNoneCanBeFound) {
@@ -72,6 +74,10 @@ TEST(FeasiblePoints, RefuseASampleBeforeItIsEvaluatedWhereNoneCanBeFound) {
       refusalOf([&] { FeasiblePoints(sumBelow(-1)).replaceInSample(sample, 0, kBounds, random); }),
       "Error: No parameter set found that satisfies the constraints\n"
       "1000002 sets drawn between the bounds cannot be run, nor can the initial values; one of them: sum too large");
+  EXPECT_THAT(refusalOf([&] {
+                FeasiblePoints(sumBelow(-1)).replaceInSample(sample, 0, {{0, 0}, {10, 10}, {}}, random);
+              }),
+              ::testing::EndsWith("1000002 sets drawn between the bounds cannot be run; one of them: sum too large"));
   // The initial set, although it is not in the sample, is the only one known.
   FeasiblePoints tiny(sumBelow(1e-9));
   SearchBounds bounds = kBounds;

@@ -97,14 +97,20 @@ TEST(ProcessFolder, NeverCopiesWhatRunsMake) {
       {"cal_Process2/big.dat", ""},
       {"other_Process1/" + std::string(run_files::kBatchLog), "of another setup's"},
       {"cal.log", "Warning: early\nMirevo 1.2, started\n"},
-      {"cal.2.dat", "# Title\n# Mirevo 1.2\n"}};
+      {"cal.2.dat", "# Title\n# Mirevo 1.2\n"},
+      {"cal_Failed17/" + std::string(run_files::kFolderMark), ""},
+      {"cal_Band_1.csv", "# Band of 90 %\n"},
+      {"cal_Simulated.bin", "1v0veriM"},
+      {"cal_Run.dat.tmp", "# Ti"}};
+  // Empty files, as a full disk leaves them, and folders of numbers.
   std::istringstream madeByName(
-      "in/deep/cal_Saved/1/out.csv cal_Saved/out.csv cal_Saved.12/out.csv cal_Failed17/run.sh cal_Optimisation.dat "
+      "in/deep/cal_Saved/1/out.csv cal_Saved/2/out.csv cal_Saved.12/3/out.csv cal_Optimisation.dat "
       "cal_Optimisation.3.dat cal.1_Sensitivity.dat cal_Band_2.csv cal_Band_2.1.csv cal_Report.html cal_Series.dat "
       "cal_Series.dat.tmp calSimErr.dat.tmp cal._spi_ calSimErr.1.dat");
   // Folders without a batch log or a setup of their name, names that runs do not give, files by their content.
   std::istringstream ours(
       "run.sh my_Process1/data.txt cal_Processes/data.txt cal_Saved.old/data.txt my_Saved/data.txt cal_Failed/run.sh "
+      "cal_Saved.3/data.txt cal_Failed18/run.sh cal_Band_3.csv cal_Simulated.1.bin cal_Report.1.html calSimErr.2.dat "
       "cal_Optimisation.old.dat cal.dat.tmp cal.dat cal.1.log cal.txt in/calSimErr.dat");
   const std::vector<std::string> left(std::istream_iterator<std::string>(madeByName), {});
   const std::vector<std::string> copied(std::istream_iterator<std::string>(ours), {});

@@ -173,11 +173,14 @@ TEST_F(EarlierRunTest, WithoutItsSettingsOrItsHeaderItIsRefused) {
   const RestartFiles files = restartFiles(folder_ / "setup", run_files::kOptimisation);
   const std::string settings = formatRestartSettings(restartSettings(config));
   const std::string damaged = "Evalu\tStatus\n" + row(1) + row(2);
+  const char* const kNoRuns =
+      "setup_Optimisation.dat has no header row that can be read\nsetup_Optimisation.dat: It is not";
   // The results, the settings (no file when empty), what is said.
   const std::tuple<std::string, std::string, const char*> cases[] = {
       {std::string(kHeader) + row(1), "", "setup_Optimisation_Restart.dat"},
       {std::string(kHeader) + row(1), "# nothing\n", "setup_Optimisation_Restart.dat"},
-      {damaged, "", "setup_Optimisation.dat has no header row that can be read"},
+      {"# Mirevo 1\n" + damaged, "", "setup_Optimisation.dat has no header row that can be read\nRestart = 0 starts"},
+      {damaged, "", kNoRuns},
       {std::string(kHeader) + row(1), settings, "setup_Optimisation.dat has other columns than"}};
   for (const auto& [results, written, detail] : cases) {
     folder_.write("setup_Optimisation.dat", results);

@@ -250,6 +250,8 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatAreSeldomMeant)
       {"Population_Size = 20 => 19 & Neighbourhood_Size = 60 => 50",
        "Population_Size: found 19, at least 20 are advised for the number of variable parameters"},
       {"No_Points_Simplex = 5 => 2", "No_Points_Simplex: found 2, at least 3 are advised"},
+      {"No_Loops_Convergence = 12 => 1", "No_Loops_Convergence: with 1 the search ends after its first loop, use at"},
+      {"No_Loops_Convergence = 12 => 1 & Min_Change = 0.005 => 0", ""},
       {"Algorithm_Type = 1 => 0", ""},
       {"Algorithm_Type = 1 => 0 & No_Points_Complex = 7 => 4 & No_Points_Subcomplex = 6 => 2",
        "No_Points_Complex: found 4, at least 5 are advised"},
@@ -268,6 +270,9 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatAreSeldomMeant)
        "No_Initial_Generations = 1, and a quadratic polynomial for 6 sets"},
       {"Algorithm_Type = 1 => 0 & Max_No_Evaluations = 500 => 27",
        "Max_No_Evaluations: the initial sample of 28 sets is cut to 27"},
+      {"Algorithm_Type = 1 => 2 & Use_Surrogate_Model = 1 => 0 & NoSimultaneousSim = 4 => 1 & "
+       "Perturbation_Parameter = 0.25 => 0",
+       "Perturbation_Parameter: 0 perturbs nothing: every candidate is the best start set again"},
       {"Algorithm_Type = 1 => 2 & Max_No_Evaluations = 500 => 10",
        "Dynamically Dimensioned Search uses no surrogate model: the search is the same as with 0, "},
   };
