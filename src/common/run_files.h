@@ -29,6 +29,7 @@ struct ResultFileNames {
   RunFile simulatedValues;          ///< of each evaluation, where the task works with them
   RunFile record;                   ///< the account of the run
   RunFile failures;                 ///< why evaluations failed
+  RunFile pairs;                    ///< how many observations the initial run and runs with fewer meet
   std::span<const RunFile> tables;  ///< in which the task gives what it found
 };
 
@@ -72,18 +73,21 @@ inline constexpr ResultFileNames kPlain{{"", ".dat", false, true},
                                         {"_Simulated", ".bin", false, false, kSimulatedMark},
                                         {"_Run", ".dat", false, true},
                                         {"_Failures", ".dat", false, true},
+                                        {"_Pairs", ".dat", false, true},
                                         kUncertaintyTables};
 inline constexpr ResultFileNames kSensitivity{{"_Sensitivity", ".dat"},
                                               {"_Sensitivity_Restart", ".dat", false, false, kRestartMark},
                                               {"_Sensitivity_Simulated", ".bin", false, false, kSimulatedMark},
                                               {"_Sensitivity_Run", ".dat"},
                                               {"_Sensitivity_Failures", ".dat"},
+                                              {"_Sensitivity_Pairs", ".dat"},
                                               kSensitivityTables};
 inline constexpr ResultFileNames kOptimisation{{"_Optimisation", ".dat"},
                                                {"_Optimisation_Restart", ".dat", false, false, kRestartMark},
                                                {"_Optimisation_Simulated", ".bin", false, false, kSimulatedMark},
                                                {"_Optimisation_Run", ".dat"},
                                                {"_Optimisation_Failures", ".dat"},
+                                               {"_Optimisation_Pairs", ".dat"},
                                                {}};
 
 /// Stands beside the setup without its name, for the run that was the first of those going on in the folder; another

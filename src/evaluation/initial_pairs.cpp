@@ -61,8 +61,8 @@ std::vector<std::string> InitialPairs::linesOfInitial() const {
     lines.push_back(fmt::format("   {}: {} pairs, {} observations without a simulated value, {} to {}",
                                 trimTrailing(measureNames_.at(pairs.measure)), pairs.count, pairs.missingCount,
                                 formatDate(dateOfSecond(pairs.first)), formatDate(dateOfSecond(pairs.last))));
-    lines.push_back(fmt::format("      {}; {}", rangeText("observed", pairs.observed),
-                                rangeText("simulated", pairs.simulated)));
+    lines.push_back(
+        fmt::format("      {}; {}", rangeText("observed", pairs.observed), rangeText("simulated", pairs.simulated)));
   }
   return lines;
 }
@@ -73,10 +73,10 @@ std::vector<FewerPairs> InitialPairs::findFewer(int number, std::span<const Meas
     const auto initial = std::find_if(initial_.begin(), initial_.end(),
                                       [&found](const MeasurePairs& other) { return other.measure == found.measure; });
     if (initial == initial_.end() || found.count >= initial->count) continue;
-    fewer.push_back({number, found.measure, found.count, initial->count,
-                     fmt::format("output measure \"{}\" has {} pairs, {} in the initial run, No. {}",
-                                 trimTrailing(measureNames_.at(found.measure)), found.count, initial->count,
-                                 initialNumber_)});
+    fewer.push_back(
+        {number, found.measure, found.count, initial->count,
+         fmt::format("output measure \"{}\" has {} pairs, {} in the initial run, No. {}",
+                     trimTrailing(measureNames_.at(found.measure)), found.count, initial->count, initialNumber_)});
   }
   return fewer;
 }

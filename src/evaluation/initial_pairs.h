@@ -63,7 +63,7 @@ class InitialPairs final {
   bool comparesSeries_ = false;
   int initialNumber_ = 0;  ///< 0: not known
   std::vector<MeasurePairs> initial_;
-  int nextNumber_ = 1;                               ///< of the first evaluation that has not finished
+  int nextNumber_ = 1;                                ///< of the first evaluation that has not finished
   std::map<int, std::vector<MeasurePairs>> waiting_;  ///< of evaluations that may be the initial one
 };
 

@@ -61,6 +61,7 @@ RunResults::RunResults(const RunConfig& config, const SearchSpace& space, const 
       files_(restartFiles(filePrefix, names_)),
       failedRuns_({pathBeside(filePrefix, run_files::kFailedRuns), files_.failures}, config.setupName, space.names,
                   tableHead_),
+      pairs_(files_.pairs, tableHead_),
       record_(files_.record, tableHead_) {
   if (config.task && config.restart != RestartMode::startAfresh) {
     auto record = record_.readEarlier();
@@ -96,9 +97,9 @@ void RunResults::open(const RunConfig& config, std::span<const ObservedSeries> o
 
 void RunResults::requireReplaceableFiles(const RunConfig& config) const {
   if (!config.task) return;
-  std::vector<RunFile> files{names_.results,     names_.restart,          names_.simulatedValues,
-                             names_.record,      names_.failures,         run_files::kSeries,
-                             run_files::kReport, run_files::kSavedFolder, run_files::kOwnFailedRuns};
+  std::vector<RunFile> files{
+      names_.results, names_.restart,     names_.simulatedValues, names_.record,           names_.failures,
+      names_.pairs,   run_files::kSeries, run_files::kReport,     run_files::kSavedFolder, run_files::kOwnFailedRuns};
   files.insert(files.end(), names_.tables.begin(), names_.tables.end());
   for (const RunFile& file : files) requireReplaceable(runFilePath(filePrefix_, file), file);
   requireReplaceable(pathBeside(filePrefix_, run_files::kFailedRuns), run_files::kFailedRuns);
@@ -144,7 +145,8 @@ void RunResults::keepEarlierFiles(const RunConfig& config, RunLog& log) const {
   if (const std::string kept = keepEarlierFile(files_.results); !kept.empty()) {
     log.line("The results of the earlier run were kept as " + kept);
   }
-  for (const std::string& path : {files_.settings, files_.simulatedValues, files_.record, files_.failures}) {
+  for (const std::string& path :
+       {files_.settings, files_.simulatedValues, files_.record, files_.failures, files_.pairs}) {
     keepEarlierFile(path);
   }
   for (const RunFile& table : names_.tables) keepEarlierFile(runFilePath(filePrefix_, table));
@@ -192,7 +194,8 @@ void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggreg
   std::optional<std::map<int, std::vector<double>>> values;
   if (simulatedValues_) values = simulatedValues_->takeUp(succeeded);
   const std::size_t withoutValues = values ? succeeded.size() - values->size() : 0;
-  auto records = earlierRecords(run, failures, std::move(values));
+  PairsByNumber pairs = pairs_.readEarlier(succeeded);
+  auto records = earlierRecords(run, failures, pairs, std::move(values));
 
   RunRecord record = recordOf(config, log);
   record.started = run.started;
@@ -202,6 +205,7 @@ void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggreg
   table_.open(files_.results, headLines(config, record), columns_, run.rows);
   // Only now: were the run killed before, rows that are gone from the table would still be in it.
   failedRuns_.continueBehind(earlier.rows, failedSets);
+  pairs_.continueBehind(std::move(pairs));
   const std::string failedFolders = runFilePath(processFolderPrefix(config), run_files::kFailedFolder);
   for (const std::string& problem : removeFailedRunFolders(failedFolders, failed)) log.warning(problem);
   // With a raised budget in it, rows that the smaller one had ended would be taken for the search's.
