@@ -29,6 +29,7 @@ struct ResultFileNames {
   RunFile simulatedValues;          ///< of each evaluation, where the task works with them
   RunFile record;                   ///< the account of the run
   RunFile failures;                 ///< why evaluations failed
+  RunFile pairs;                    ///< how many observations the initial run and runs with fewer meet
   std::span<const RunFile> tables;  ///< in which the task gives what it found
 };
 
@@ -73,15 +74,27 @@ constexpr RunFile simulatedFile(std::string_view stem) {
 }
 
 /// Scenario runs and the uncertainty analysis.
-inline constexpr ResultFileNames kPlain{{"", ".dat", false, true},          restartFile("_Restart"),
-                                        simulatedFile("_Simulated"),        {"_Run", ".dat", false, true},
-                                        {"_Failures", ".dat", false, true}, kUncertaintyTables};
-inline constexpr ResultFileNames kSensitivity{
-    {"_Sensitivity", ".dat"},     restartFile("_Sensitivity_Restart"), simulatedFile("_Sensitivity_Simulated"),
-    {"_Sensitivity_Run", ".dat"}, {"_Sensitivity_Failures", ".dat"},   kSensitivityTables};
-inline constexpr ResultFileNames kOptimisation{
-    {"_Optimisation", ".dat"},     restartFile("_Optimisation_Restart"), simulatedFile("_Optimisation_Simulated"),
-    {"_Optimisation_Run", ".dat"}, {"_Optimisation_Failures", ".dat"},   {}};
+inline constexpr ResultFileNames kPlain{{"", ".dat", false, true},
+                                        restartFile("_Restart"),
+                                        simulatedFile("_Simulated"),
+                                        {"_Run", ".dat", false, true},
+                                        {"_Failures", ".dat", false, true},
+                                        {"_Pairs", ".dat", false, true},
+                                        kUncertaintyTables};
+inline constexpr ResultFileNames kSensitivity{{"_Sensitivity", ".dat"},
+                                              restartFile("_Sensitivity_Restart"),
+                                              simulatedFile("_Sensitivity_Simulated"),
+                                              {"_Sensitivity_Run", ".dat"},
+                                              {"_Sensitivity_Failures", ".dat"},
+                                              {"_Sensitivity_Pairs", ".dat"},
+                                              kSensitivityTables};
+inline constexpr ResultFileNames kOptimisation{{"_Optimisation", ".dat"},
+                                               restartFile("_Optimisation_Restart"),
+                                               simulatedFile("_Optimisation_Simulated"),
+                                               {"_Optimisation_Run", ".dat"},
+                                               {"_Optimisation_Failures", ".dat"},
+                                               {"_Optimisation_Pairs", ".dat"},
+                                               {}};
 
 inline constexpr std::string_view kFailuresMark = "# Failed evaluations of ";
 /// Stands beside the setup without its name, for the run that was the first of those going on in the folder; another

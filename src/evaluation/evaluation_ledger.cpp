@@ -12,6 +12,7 @@ void EvaluationLedger::begin(std::span<const ParameterSet> sets, DispatchMode mo
   isFinished_.assign(sets.size(), false);
   next_ = 0;
   finishedCount_ = 0;
+  openCount_ = 0;
   isFinalRun_ = mode == DispatchMode::finalRun;
   if (earlier_ == nullptr || isFinalRun_) return;
   for (std::size_t place = 0; place < sets.size(); ++place) {
@@ -20,12 +21,17 @@ void EvaluationLedger::begin(std::span<const ParameterSet> sets, DispatchMode mo
 }
 
 void EvaluationLedger::replay(std::size_t place, EvaluationResult result) {
+  const PairsFound found = initialPairs_.take(result);
   observer_.evaluationReplayed(sets_[place], result);
+  tell(found);
   store(place, std::move(result));
 }
 
 /// Stores and counts a result that has been reported.
 void EvaluationLedger::store(std::size_t place, EvaluationResult result) {
+  // Not needed any more; the batch keeps its results until it is complete.
+  result.shownSeries = {};
+  result.pairs = {};
   const EvaluationResult& stored = results_[place] = std::move(result);
   isFinished_[place] = true;
   ++finishedCount_;
@@ -35,6 +41,8 @@ void EvaluationLedger::store(std::size_t place, EvaluationResult result) {
 std::optional<std::size_t> EvaluationLedger::takeNext() {
   while (next_ < sets_.size() && isFinished_[next_]) ++next_;
   if (next_ == sets_.size()) return std::nullopt;
+  if (openCount_ > 0 && initialPairs_.isAwaited()) return std::nullopt;
+  ++openCount_;
   return next_++;
 }
 
@@ -44,6 +52,7 @@ void EvaluationLedger::markInitiated(std::size_t place) {
 
 void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::string_view leftBehind) {
   result.number = numberOf(place);
+  --openCount_;
   if (!leftBehind.empty()) {
     observer_.warning(progress::nameOfEvaluation(result.number).append(": ").append(leftBehind));
   }
@@ -58,15 +67,24 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
   }
   std::optional<EvaluationResult> known;  // a repeated run has its row already, which is kept
   if (earlier_ != nullptr) known = earlier_->take(result.number, sets_[place]);
-  if (!known) observer_.recordEvaluation(sets_[place], result);
+  PairsFound found;
+  if (!known) {
+    found = initialPairs_.take(result);
+    observer_.recordEvaluation(sets_[place], result);
+  }
   observer_.message(progress::completedMessage(result.number, outcome));
   if (known) {
     known->shownSeries = std::move(result.shownSeries);
+    known->pairs = std::move(result.pairs);
     return replay(place, std::move(*known));
   }
   observer_.evaluationFinished(sets_[place], result);
-  result.shownSeries = {};  // not needed any more; the batch keeps its results until it is complete
+  tell(found);
   store(place, std::move(result));
+}
+
+void EvaluationLedger::tell(const PairsFound& found) {
+  if (!found.isEmpty()) observer_.pairsFound(found);
 }
 
 void EvaluationLedger::warnOfUnusedObservations(const EvaluationResult& result) {
@@ -89,6 +107,7 @@ std::vector<EvaluationResult> EvaluationLedger::close() {
   isFinished_.clear();
   next_ = 0;
   finishedCount_ = 0;
+  openCount_ = 0;
   return std::exchange(results_, {});
 }
 

@@ -12,7 +12,7 @@ struct KindNames {
 };
 
 /// In the order of the kinds. The keys are used in files and never change; the names are for people.
-constexpr std::array<KindNames, 11> kKinds = {{
+constexpr std::array<KindNames, 12> kKinds = {{
     {"constraintsViolated", "parameter constraints violated"},
     {"equationNotFinite", "equation without a finite value"},
     {"valueNotWritable", "value that cannot be written in its field"},
@@ -23,6 +23,7 @@ constexpr std::array<KindNames, 11> kKinds = {{
     {"resultsNotWritten", "results not written"},
     {"resultsNotReadable", "results not readable"},
     {"resultNotFinite", "result not finite"},
+    {"tooFewPairs", "too few pairs of simulated and observed values"},
     {"notKnown", "reason not known any more"},
 }};
 

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -26,6 +27,7 @@ struct EvaluationFailure {
     resultsNotWritten,
     resultsNotReadable,
     resultNotFinite,
+    tooFewPairs,
     notKnown,  ///< failed in an earlier run, whose evidence is gone
   };
   Kind kind = Kind::exitCode;
@@ -52,6 +54,28 @@ struct UnusedObservations {
   std::string text;           ///< one line for the log
 };
 
+/// Least, mean and largest of some values.
+struct ValueSummary {
+  double least = 0.0;
+  double mean = 0.0;
+  double largest = 0.0;
+
+  bool operator==(const ValueSummary&) const = default;
+};
+
+/// The pairs of simulated and observed values by which a measure judges a model run; at least one.
+struct MeasurePairs {
+  std::size_t measure = 0;  ///< 0-based
+  std::size_t count = 0;
+  std::size_t missingCount = 0;  ///< observations in the period without a simulated value
+  std::int64_t first = 0;        ///< secondNumber() of the first pair
+  std::int64_t last = 0;
+  ValueSummary observed;  ///< in the pairs
+  ValueSummary simulated;
+
+  bool operator==(const MeasurePairs&) const = default;
+};
+
 /// What one parameter set yielded.
 struct EvaluationResult {
   int number = 0;                       ///< the set's number in the run, from 1
@@ -67,6 +91,9 @@ struct EvaluationResult {
   std::vector<PeriodSeries> shownSeries;
   std::optional<EvaluationFailure> failure;
   std::vector<UnusedObservations> unusedObservations;
+  /// One per measure that compares series. Empty once the evaluation has been reported, and for an evaluation of an
+  /// earlier run that is known to have no fewer than the initial run.
+  std::vector<MeasurePairs> pairs;
   std::vector<std::string> warnings;  ///< warnings for the log, one line each
 
   bool ok() const { return !failure.has_value(); }

@@ -11,7 +11,7 @@ LocalEvaluator::LocalEvaluator(ModelRunner& runner, EvaluationObserver& observer
                                int slotCount, EarlierEvaluations* earlier)
     : runner_(runner),
       observer_(observer),
-      ledger_(observer, failedRuns, earlier, runner.equalMeasures()),
+      ledger_(observer, failedRuns, earlier, runner.equalMeasures(), runner.initialPairs()),
       slots_(static_cast<std::size_t>(slotCount)) {
   assert(slotCount > 0);
 }
@@ -19,17 +19,25 @@ LocalEvaluator::LocalEvaluator(ModelRunner& runner, EvaluationObserver& observer
 std::vector<EvaluationResult> LocalEvaluator::evaluateParameterSets(std::span<const ParameterSet> sets,
                                                                     DispatchMode mode) {
   ledger_.begin(sets, mode);
-  for (int slot = 1; slot <= static_cast<int>(slots_.size()); ++slot) startNext(slot);
+  startInFreeSlots();
   while (!ledger_.isComplete()) {
     if (!takeFinished()) runner_.launcher().waitForChange(kPollSeconds);
     stopIfCancelled();
+    startInFreeSlots();
   }
   return ledger_.end();
+}
+
+void LocalEvaluator::startInFreeSlots() {
+  for (int slot = 1; slot <= static_cast<int>(slots_.size()); ++slot) {
+    if (!slots_[static_cast<std::size_t>(slot - 1)]) startNext(slot);
+  }
 }
 
 void LocalEvaluator::startNext(int slot) {
   while (const auto place = ledger_.takeNext()) {
     stopIfCancelled();
+    runner_.requirePairs(ledger_.requiredPairs());
     auto failure = runner_.prepareModelRun(ledger_.set(*place), slot);
     if (!failure) {
       ledger_.markInitiated(*place);

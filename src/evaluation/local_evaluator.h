@@ -27,6 +27,7 @@ class LocalEvaluator final : public Evaluator {
   void settleAggregates(std::span<EvaluationResult> sample) override;
 
  private:
+  void startInFreeSlots();
   /// Starts the next set on the free slot; sets that cannot be run get their result at once and are skipped.
   void startNext(int slot);
   /// Takes the results of slots whose batch has ended and starts the next sets there; false when none has ended.

@@ -5,6 +5,7 @@
 #include <cmath>
 #include <cstring>
 #include <filesystem>
+#include <numeric>
 #include <sys/stat.h>
 #include <unistd.h>
 #include <utility>
@@ -69,6 +70,27 @@ std::string_view resistanceUpdateText(ResistanceUpdate outcome) {
       return "File extension \".qcsr\" is expected";
   }
   return {};
+}
+
+template <class Values>
+ValueSummary summaryOf(const Values& values) {
+  const auto [least, largest] = std::minmax_element(values.begin(), values.end());
+  const double sum = std::accumulate(values.begin(), values.end(), 0.0);
+  return {*least, sum / static_cast<double>(values.size()), *largest};
+}
+
+MeasurePairs pairsOf(std::size_t measure, const MeasureStatistics& statistics, const TimeSeriesObject& simulation) {
+  const std::int64_t start = secondNumber(simulation.startTime().value());
+  constexpr double kDaySeconds = 86400.0;
+  const auto second = [start](double days) { return start + std::llround(days * kDaySeconds); };
+  const std::size_t count = statistics.simulatedValues.size();
+  return {measure,
+          count,
+          statistics.observationCount - count,
+          second(statistics.times.front()),
+          second(statistics.times.back()),
+          summaryOf(statistics.observedValues),
+          summaryOf(statistics.simulatedValues)};
 }
 
 void removeFile(const std::string& path) {
@@ -164,6 +186,16 @@ EqualMeasures ModelRunner::equalMeasures() const {
     for (std::string& file : *files) file.erase(0, description_.baseFolder.size() + 1);
   }
   return {parameters_.searchSpace(), std::move(names), std::move(written), std::move(read)};
+}
+
+InitialPairs ModelRunner::initialPairs() const {
+  std::vector<std::string> names;
+  bool comparesSeries = false;
+  for (const OutputMeasure& measure : description_.measures) {
+    names.push_back(measure.name);
+    comparesSeries = comparesSeries || measure.interfaceType == InterfaceType::timeSeries;
+  }
+  return comparesSeries ? InitialPairs(std::move(names), description_.minimumCoverage > 0.0) : InitialPairs();
 }
 
 std::string ModelRunner::slotPath(const std::string& baseFile, int slot) const {
@@ -377,10 +409,26 @@ std::optional<EvaluationFailure> ModelRunner::readSeriesMeasure(int slot, std::s
         computeMeasureStatistics(measure, description_.period, simulation, series_.observation(i));
     result.measureValues[i] = selectStatistic(statistics, measure.statisticType);
     noteUnusedObservations(i, statistics, result);
+    result.pairs.push_back(pairsOf(i, statistics, simulation));
+    return findLackOfPairs(i, statistics.simulatedValues.size(), slot);
   } catch (const FatalError& error) {  // the message names the file as in the setup
     fatalError(error.message(), error.detail() + "\nread from " + path);
   }
-  return std::nullopt;
+}
+
+std::optional<EvaluationFailure> ModelRunner::findLackOfPairs(std::size_t i, std::size_t count, int slot) const {
+  if (requiredPairs_.initialCounts.empty()) return std::nullopt;
+  const std::size_t initial = requiredPairs_.initialCounts.at(i);
+  // A quotient is rounded to the number that the setup gives, a product need not be: 3 of 30 pairs are 0.1.
+  if (initial == 0 || static_cast<double>(count) / static_cast<double>(initial) >= description_.minimumCoverage) {
+    return std::nullopt;
+  }
+  return makeFailure(Kind::tooFewPairs,
+                     fmt::format("output measure \"{}\" has {} pairs of simulated and observed values, {} in the "
+                                 "initial run, No. {}: a share below Minimum_Coverage = {}",
+                                 trimTrailing(description_.measures[i].name), count, initial,
+                                 requiredPairs_.initialNumber, formatReal(description_.minimumCoverage)),
+                     slot);
 }
 
 void ModelRunner::noteUnusedObservations(std::size_t i, const MeasureStatistics& statistics,

@@ -7,6 +7,7 @@
 
 #include "evaluation/equal_measures.h"
 #include "evaluation/evaluation_result.h"
+#include "evaluation/initial_pairs.h"
 #include "evaluation/saved_files.h"
 #include "evaluation/shown_runs.h"
 #include "measures/measure_statistics.h"
@@ -28,6 +29,7 @@ struct ModelDescription {
   std::vector<OutputMeasure> measures;
   std::string measureFile;  ///< output-measure file; empty when no measure is of interface type 1
   EvaluationPeriod period;
+  double minimumCoverage = 0.0;  ///< share of the initial run's pairs below which a run fails
   std::vector<ObjectiveFunction> objectives;
   std::vector<std::string> savedFiles;  ///< files kept from every model run
   std::string savedFolder;              ///< where they are kept
@@ -48,6 +50,9 @@ class ModelRunner final {
 
   /// Why the set cannot be run; empty if it can.
   std::optional<EvaluationFailure> findUnrunnable(std::span<const double> set);
+
+  /// From now on a model run with less than the least share of these pairs is a failed evaluation.
+  void requirePairs(RequiredPairs required) { requiredPairs_ = std::move(required); }
 
   /// Builds the full parameter vector, removes the results of the slot's last run, writes the parameter files and
   /// starts the batch; or returns why the set is not run. Throws FatalError when a file cannot be removed or written.
@@ -78,6 +83,8 @@ class ModelRunner final {
   const std::vector<ParameterTemplate>& templates() const { return templates_; }
   /// A check for a model that ignores its parameters, for the evaluations of a run.
   EqualMeasures equalMeasures() const;
+  /// A comparison of the pairs of model runs, for the evaluations of a run.
+  InitialPairs initialPairs() const;
   /// templateDoubts() of all templates.
   const std::vector<std::string>& templateWarnings() const { return templateWarnings_; }
 
@@ -103,6 +110,7 @@ class ModelRunner final {
   /// cannot be used.
   std::optional<EvaluationFailure> readMeasures(int slot, EvaluationResult& result);
   std::optional<EvaluationFailure> readSeriesMeasure(int slot, std::size_t measure, EvaluationResult& result);
+  std::optional<EvaluationFailure> findLackOfPairs(std::size_t measure, std::size_t count, int slot) const;
   void noteUnusedObservations(std::size_t measure, const MeasureStatistics& statistics, EvaluationResult& result) const;
   EvaluationFailure makeFailure(EvaluationFailure::Kind kind, std::string reason, int slot) const;
 
@@ -118,6 +126,7 @@ class ModelRunner final {
   std::vector<ObservedSeries> observedSeries_;
   std::vector<std::size_t> shownMeasures_;
   ShownRuns shownRuns_;
+  RequiredPairs requiredPairs_;
   std::vector<SlotFiles> slots_;
 };
 

@@ -51,6 +51,7 @@ class ReportBuilder final {
   void addEvaluations();
   void findBestAndInitial();
   void addMeasures();
+  void noteFewerPairsOfBest();
   void addFailures();
   void addSeries();
   void addAnalyses();
@@ -98,6 +99,7 @@ ReportData ReportBuilder::build() {
   findBestAndInitial();
   data_.parameters = reportedParameters(config_, parameters_, best_);
   addMeasures();
+  noteFewerPairsOfBest();
   addFailures();
   addSeries();
   addAnalyses();
@@ -192,6 +194,25 @@ void ReportBuilder::addMeasures() {
   for (std::size_t i = 0; i < config_.objectives.size(); ++i) {
     data_.objectives.push_back({config_.objectives[i].name, valueOf(initial_, &ResultRow::objectives, i),
                                 valueOf(best_, &ResultRow::objectives, i)});
+  }
+}
+
+/// In a run that has come to its end the closing lines of its results say so.
+void ReportBuilder::noteFewerPairsOfBest() {
+  if (best_ == nullptr || !data_.summary.empty()) return;
+  const PairsByNumber pairs =
+      readPairs(filePrefix_, config_.task->facts().resultFiles).content.value_or(PairsByNumber{});
+  const auto ofBest = pairs.find(best_->number);
+  if (ofBest == pairs.end()) return;
+  for (const MeasurePairs& found : ofBest->second) {
+    const std::vector<MeasurePairs>& initial = pairs.begin()->second;
+    const auto same = std::find_if(initial.begin(), initial.end(),
+                                   [&found](const MeasurePairs& other) { return other.measure == found.measure; });
+    if (same == initial.end() || found.count >= same->count || found.measure >= config_.measures.size()) continue;
+    note(fmt::format(
+        "The best evaluation, No. {}, is judged by fewer observations than the initial run: output "
+        "measure \"{}\" has {} pairs, {} in the initial run, No. {}.",
+        best_->number, config_.measures[found.measure].name, found.count, same->count, pairs.begin()->first));
   }
 }
 

@@ -85,6 +85,10 @@ OptionalSource<std::vector<FailureRow>> readFailures(const std::string& filePref
   return readSource<std::vector<FailureRow>>(runFilePath(filePrefix, names.failures), readFailureTable);
 }
 
+OptionalSource<PairsByNumber> readPairs(const std::string& filePrefix, const ResultFileNames& names) {
+  return readSource<PairsByNumber>(runFilePath(filePrefix, names.pairs), readPairsTable);
+}
+
 OptionalSource<SeriesTable> readSeries(const std::string& filePrefix) {
   return readSource<SeriesTable>(runFilePath(filePrefix, run_files::kSeries), readSeriesTable);
 }

@@ -6,6 +6,7 @@
 
 #include "parameters/search_space.h"
 #include "run/results/failure_table.h"
+#include "run/results/pairs_file.h"
 #include "run/results/result_table.h"
 #include "run/results/run_record.h"
 #include "run/results/series_table.h"
@@ -36,6 +37,7 @@ std::optional<RunSources> readRunSources(const RunConfig& config, const SearchSp
                                          const std::string& filePrefix, std::string& reason);
 
 OptionalSource<std::vector<FailureRow>> readFailures(const std::string& filePrefix, const ResultFileNames& names);
+OptionalSource<PairsByNumber> readPairs(const std::string& filePrefix, const ResultFileNames& names);
 OptionalSource<SeriesTable> readSeries(const std::string& filePrefix);
 
 }  // namespace mirevo

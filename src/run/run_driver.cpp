@@ -227,8 +227,9 @@ void RunDriver::openResults() {
   results_->open(config_, runner_->observedSeries(), *aggregator_, state_.log);
   putEarlierReportAside();
   signalState.resultFileDescriptor = results_->table().descriptor();
-  reporter_ = std::make_unique<RunReporter>(state_, results_->table(), results_->failedRuns(),
-                                            parameters_->searchSpace(), results_->simulatedValues());
+  reporter_ =
+      std::make_unique<RunReporter>(state_, results_->table(), results_->failedRuns(), parameters_->searchSpace(),
+                                    results_->simulatedValues(), &results_->pairs());
   openSeries();
   failedRunPolicy_.emplace(config_.plannedEvaluations(), config_.failedRunFolders);
   EarlierEvaluations* const earlier = results_->earlierEvaluations();
@@ -348,7 +349,12 @@ std::vector<std::string> RunDriver::keepStatistics() {
 
 std::vector<std::string> RunDriver::closingLines(const Ending& ending) const {
   std::vector<std::string> lines{ending.closingLine, "Ended: " + ending.time};
-  if (!reporter_ || !reporter_->best()) return lines;
+  if (!reporter_) return lines;
+  const std::vector<std::string> fewerPairs = reporter_->fewerPairsLines();
+  if (!reporter_->best()) {
+    lines.insert(lines.end(), fewerPairs.begin(), fewerPairs.end());
+    return lines;
+  }
   const std::vector<std::string> scales = aggregator_->scaleLines();
   lines.insert(lines.end(), scales.begin(), scales.end());
   const BestEvaluation& best = *reporter_->best();
@@ -358,6 +364,8 @@ std::vector<std::string> RunDriver::closingLines(const Ending& ending) const {
   for (std::size_t i = 0; i < names.size(); ++i) {
     lines.push_back(fmt::format("Best {} = {}", names[i], formatReal(best.parameterValues[i])));
   }
+  if (const std::string text = reporter_->fewerPairsOfBest(); !text.empty()) lines.push_back("Warning: " + text);
+  lines.insert(lines.end(), fewerPairs.begin(), fewerPairs.end());
   return lines;
 }
 
@@ -396,6 +404,9 @@ std::optional<RunDriver::Unwritten> RunDriver::closeResults(const Ending& ending
   std::optional<Unwritten> unwritten;
   std::string reason;
   if (!results_->table().finish(lines, reason)) unwritten = {results_->table().path(), reason};
+  if (reporter_ && !results_->pairs().finish(reporter_->numbersWithPairs(), reason) && !unwritten) {
+    unwritten = {results_->pairs().path(), reason};
+  }
   completeRecord(ending);
   if (!results_->record().end(reason) && !unwritten) unwritten = {results_->record().path(), reason};
   return unwritten;
@@ -411,6 +422,8 @@ void RunDriver::reportRun() {
 
 void RunDriver::finish(const TaskOutcome& outcome) {
   results_->close();
+  reporter_->settle(*aggregator_);
+  warnOfFewerPairs();
   results_->writeTables(outcome.tables);
   const Ending ending{RunStage::finished, outcome.terminationMessage, outcome.terminationMessage};
   if (const auto unwritten = closeResults(ending, outcome.report)) {
@@ -466,6 +479,19 @@ void RunDriver::logFailures() {
   for (const std::string& line : reporter_->failures().lines()) state_.log.line(line);
 }
 
+/// Says how many evaluations are judged by fewer observations than the initial run; to the user, too, if the best is
+/// one of them.
+void RunDriver::warnOfFewerPairs() {
+  if (!reporter_) return;
+  const std::size_t compared = reporter_->numbersWithPairs().size();
+  if (compared < 2) return;
+  const std::size_t count = compared - 1;
+  state_.log.warning(fmt::format("{} judged by fewer observations than the initial run: the end of {} names {}",
+                                 count == 1 ? "1 evaluation is" : fmt::format("{} evaluations are", count),
+                                 fileNameOf(results_->table().path()), count == 1 ? "it" : "them"));
+  if (const std::string text = reporter_->fewerPairsOfBest(); !text.empty()) warn(text);
+}
+
 /// Nothing that goes wrong here may hide why the run ended.
 void RunDriver::closeResultsOfEarlyEnd(const Ending& ending, std::span<const std::string> report) {
   try {
@@ -489,6 +515,7 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
     }
     if (!details.empty()) explained += "\n" + details;
     statistics = keepStatistics();
+    warnOfFewerPairs();
     endLogInError(text, details);
     showMessage(explained);
   }
@@ -517,6 +544,7 @@ void RunDriver::endLogInError(std::string_view message, std::string_view details
 int RunDriver::endCancelled(std::string_view message) {
   showMessage(message, {}, MessageType::information);
   const std::vector<std::string> statistics = keepStatistics();
+  warnOfFewerPairs();
   if (!statistics.empty()) {
     state_.log.line("");
     state_.log.line(message);

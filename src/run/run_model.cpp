@@ -20,6 +20,7 @@ ModelDescription describeModel(const RunConfig& config) {
   model.measures = config.measures;
   model.measureFile = config.measureFile;
   model.period = config.period;
+  model.minimumCoverage = config.minimumCoverage;
   model.objectives = config.objectives;
   for (const SavedOutputFile& file : config.savedOutputFiles) model.savedFiles.push_back(file.fileName);
   model.savedFolder = runFilePath(config.setupFolder + "/" + config.setupName, run_files::kSavedFolder);

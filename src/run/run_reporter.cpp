@@ -2,18 +2,28 @@
 
 #include <cmath>
 
+#include <fmt/core.h>
+
 #include "common/clock.h"
 #include "common/fatal_error.h"
+#include "common/progress_messages.h"
+#include "common/run_files.h"
 
 namespace mirevo {
+namespace {
+
+constexpr std::size_t kMostLinesOfFewerPairs = 20;
+
+}  // namespace
 
 RunReporter::RunReporter(RunState& state, ResultFile& results, FailedRunFile& failedRuns, const SearchSpace& space,
-                         SimulatedValuesFile* simulatedValues)
+                         SimulatedValuesFile* simulatedValues, PairsFile* pairs)
     : state_(state),
       results_(results),
       failedRuns_(failedRuns),
       space_(space),
       simulatedValues_(simulatedValues),
+      pairs_(pairs),
       initial_(ToModelScale(space, space.initial)) {}
 
 void RunReporter::message(std::string_view text) {
@@ -30,6 +40,7 @@ void RunReporter::recordEvaluation(std::span<const double> set, const Evaluation
   // The row is written last: if it is on disk, all that belongs to it is, too, whenever the program ends.
   if (!result.ok()) failedRuns_.add(values, result);
   if (result.ok() && simulatedValues_ != nullptr) simulatedValues_->add(result);
+  if (!result.pairs.empty() && pairs_ != nullptr) pairs_->add(result.number, result.pairs);
   results_.addRow(resultRow(values, result));
 }
 
@@ -53,6 +64,50 @@ void RunReporter::evaluationReplayed(std::span<const double> set, const Evaluati
   } else if (result.ok() && recorder_ != nullptr) {
     recorder_->evaluationPassed(result.number, values);
   }
+}
+
+void RunReporter::pairsFound(const PairsFound& found) {
+  if (found.initialNumber != 0) initialRun_ = found.initialNumber;
+  for (const std::string& line : found.initialLines) state_.log.line(line);
+  for (const FewerPairs& fewer : found.fewer) {
+    state_.log.line(fmt::format("   {}: {}", progress::nameOfEvaluation(fewer.number), fewer.text));
+    fewer_.insert_or_assign({fewer.number, fewer.measure}, fewer);
+  }
+}
+
+std::vector<std::string> RunReporter::fewerPairsLines() const {
+  std::vector<std::string> lines;
+  std::set<int> shown;
+  std::set<int> all;
+  for (const auto& [key, fewer] : fewer_) {
+    all.insert(key.first);
+    if (lines.size() == kMostLinesOfFewerPairs) continue;
+    shown.insert(key.first);
+    lines.push_back(fmt::format("Fewer pairs: evaluation {}: {}", fewer.number, fewer.text));
+  }
+  if (all.size() > shown.size()) {
+    lines.push_back(fmt::format("Fewer pairs: {} more evaluations{}", all.size() - shown.size(),
+                                pairs_ == nullptr ? "" : ", see " + fileNameOf(pairs_->path())));
+  }
+  return lines;
+}
+
+std::string RunReporter::fewerPairsOfBest() const {
+  if (!best()) return {};
+  std::string found;
+  for (const auto& [key, fewer] : fewer_) {
+    if (key.first == best()->number) found.append(found.empty() ? "" : "; ").append(fewer.text);
+  }
+  if (found.empty()) return {};
+  return fmt::format("The best evaluation, No. {}, is judged by fewer observations than the initial run: {}",
+                     best()->number, found);
+}
+
+std::set<int> RunReporter::numbersWithPairs() const {
+  if (initialRun_ == 0) return {};
+  std::set<int> numbers{initialRun_};
+  for (const auto& [key, fewer] : fewer_) numbers.insert(key.first);
+  return numbers;
 }
 
 void RunReporter::count(const std::vector<double>& parameterValues, const EvaluationResult& result,

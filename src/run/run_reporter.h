@@ -1,7 +1,10 @@
 #pragma once
 
+#include <map>
 #include <optional>
+#include <set>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "algorithms/searches/search_algorithm.h"
@@ -11,6 +14,7 @@
 #include "parameters/search_space.h"
 #include "run/results/failed_run_file.h"
 #include "run/results/failure_summary.h"
+#include "run/results/pairs_file.h"
 #include "run/results/result_file.h"
 #include "run/results/series_recorder.h"
 #include "run/results/simulated_values_file.h"
@@ -22,9 +26,9 @@ namespace mirevo {
 class RunReporter final : public EvaluationObserver {
  public:
   /// The result file must be open; all must outlive the reporter. `simulatedValues` receives those of every evaluation;
-  /// may be null.
+  /// and `pairs` those that are to be kept; both may be null.
   RunReporter(RunState& state, ResultFile& results, FailedRunFile& failedRuns, const SearchSpace& space,
-              SimulatedValuesFile* simulatedValues = nullptr);
+              SimulatedValuesFile* simulatedValues = nullptr, PairsFile* pairs = nullptr);
 
   /// From now on `recorder` records the series of the initial and the best evaluation; it must outlive the reporter.
   void recordSeries(SeriesRecorder& recorder) { recorder_ = &recorder; }
@@ -34,6 +38,7 @@ class RunReporter final : public EvaluationObserver {
   void recordEvaluation(std::span<const double> set, const EvaluationResult& result) override;
   void evaluationFinished(std::span<const double> set, const EvaluationResult& result) override;
   void evaluationReplayed(std::span<const double> set, const EvaluationResult& result) override;
+  void pairsFound(const PairsFound& found) override;
   bool isCancelled() override { return state_.progress.isCancelled(); }
 
   /// At the end of a run: fills in the aggregates of evaluations made before the transformation of the objective
@@ -47,6 +52,15 @@ class RunReporter final : public EvaluationObserver {
   const std::optional<BestEvaluation>& best() const { return best_.best(); }
   /// The number of the initial evaluation; empty before an evaluation has succeeded.
   const std::optional<int>& initial() const { return initial_.number(); }
+
+  /// The evaluations that have fewer pairs than the initial run: the first of them a line each, and how many more.
+  /// Empty without any.
+  std::vector<std::string> fewerPairsLines() const;
+  /// A sentence that says so of the best evaluation; empty if it has all of them.
+  std::string fewerPairsOfBest() const;
+  /// The initial run and the evaluations that have fewer pairs; empty as long as it is not known which is the initial
+  /// one.
+  std::set<int> numbersWithPairs() const;
 
   int evaluationCount() const { return evaluationCount_; }
   int failedCount() const { return failedCount_; }
@@ -73,6 +87,7 @@ class RunReporter final : public EvaluationObserver {
   FailedRunFile& failedRuns_;
   const SearchSpace& space_;
   SimulatedValuesFile* simulatedValues_;
+  PairsFile* pairs_;
   SeriesRecorder* recorder_ = nullptr;
   BestChoice best_;
   InitialChoice initial_;
@@ -81,6 +96,8 @@ class RunReporter final : public EvaluationObserver {
   int failedCount_ = 0;
   int replayedCount_ = 0;
   FailureSummary failures_;
+  int initialRun_ = 0;                                       ///< with whose pairs others are compared
+  std::map<std::pair<int, std::size_t>, FewerPairs> fewer_;  ///< by evaluation and measure
 };
 
 }  // namespace mirevo

@@ -30,9 +30,16 @@ class RecordingObserver final : public EvaluationObserver {
   void evaluationReplayed(std::span<const double> set, const EvaluationResult& result) override {
     events.push_back(fmt::format("replay {} a={} {}", result.number, set[0], result.ok() ? "OK" : "FAILED"));
   }
+  void pairsFound(const PairsFound& found) override {
+    if (found.initialNumber != 0) pairs.push_back(fmt::format("initial {}", found.initialNumber));
+    for (const FewerPairs& fewer : found.fewer) {
+      pairs.push_back(fmt::format("{} has {} of {}", fewer.number, fewer.count, fewer.initialCount));
+    }
+  }
   bool isCancelled() override { return cancelled; }
 
   std::vector<std::string> events;
+  std::vector<std::string> pairs;  ///< what is told of them
   bool cancelled = false;
 };
 
@@ -82,6 +89,7 @@ class EvaluationTest : public testing::Test {
       const double measure = std::abs(value) - 1.0;
       record.parameterValues = {std::abs(value)};
       record.result = {.measureValues = {measure}, .objectiveValues = {std::abs(measure)}};
+      record.result.pairs = {{.count = 5}};
       if (value < 0) record.result.failure = EvaluationFailure{EvaluationFailure::Kind::signal, "in the past", {}};
     }
     earlier_ = std::make_unique<EarlierEvaluations>(parameters_->searchSpace(), *aggregator_, std::move(records));

@@ -1,5 +1,7 @@
 #include "evaluation/local_evaluator.h"
 
+#include <fstream>
+#include <map>
 #include <tuple>
 
 #include "evaluation/evaluation_fixture.h"
@@ -100,6 +102,44 @@ TEST_F(LocalEvaluatorTest, TheFailureAfterTheLimitEndsTheRunOnceItIsOnRecord) {
                           fatalFailure, planned / 10, planned, fatalFailure));
     EXPECT_EQ(observer_.events.back(), fmt::format("record {} a=2 FAILED", fatalFailure));
     EXPECT_EQ(launcher.starts, fatalFailure);
+  }
+}
+
+TEST_F(LocalEvaluatorTest, RunsAreComparedWithTheFirstSuccessWhateverEndsFirst) {
+  const std::vector<std::size_t> days{0, 4, 5, 2, 3};  // that each run writes; 0: it fails
+  // coverage, evaluations of an earlier run, what fails, what is told of the pairs
+  const std::tuple<double, std::map<int, double>, std::vector<int>, std::vector<std::string>> cases[] = {
+      {0.0, {}, {1}, {"initial 2", "4 has 2 of 4", "5 has 3 of 4"}},
+      {0.5, {}, {1}, {"initial 2", "4 has 2 of 4", "5 has 3 of 4"}},
+      {0.6, {}, {1, 4}, {"initial 2", "5 has 3 of 4"}},
+      {0.6, {{1, 2.0}}, {4}, {"initial 1", "2 has 4 of 5", "5 has 3 of 5"}},  // 3 of 5 are 0.6
+      {1.0, {{1, -2.0}, {2, 2.0}}, {1, 4, 5}, {"initial 2"}},
+  };
+  for (const auto& [coverage, earlier, failing, told] : cases) {
+    description_.minimumCoverage = coverage;
+    for (const int slots : {1, 3}) {
+      observer_.pairs.clear();
+      takeUp(earlier);
+      const auto firstRun = earlier.size();
+      FakeLauncher launcher([&](int start, const std::string&) {
+        const std::size_t place = firstRun + static_cast<std::size_t>(start) - 1;
+        FakeLauncher::Batch batch = days[place] == 0 ? fails(5.0) : computes(5.0 - static_cast<double>(place));
+        batch.write = [count = days[place]](const std::string& folder) {
+          const std::string whole = series(3.0);
+          constexpr std::size_t kHeader = 10, kLine = 13;
+          std::ofstream(folder + "/simulated.csv") << whole.substr(0, kHeader + count * kLine);
+        };
+        return batch;
+      });
+      std::vector<int> failed;
+      for (const EvaluationResult& result : evaluate(makeEvaluator(launcher, slots, 100), std::vector(5, 2.0))) {
+        if (!result.ok()) failed.push_back(result.number);
+        if (result.number < 4 || result.ok()) continue;
+        EXPECT_EQ(result.failure->kind, EvaluationFailure::Kind::tooFewPairs);
+      }
+      EXPECT_EQ(failed, failing) << coverage << " " << slots;
+      EXPECT_THAT(observer_.pairs, testing::UnorderedElementsAreArray(told)) << coverage << " " << slots;
+    }
   }
 }
 

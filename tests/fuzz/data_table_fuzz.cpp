@@ -6,6 +6,7 @@
 #include "common/data_table.h"
 #include "require.h"
 #include "run/results/failure_table.h"
+#include "run/results/pairs_file.h"
 #include "run/results/restart_settings.h"
 #include "run/results/run_record.h"
 #include "run/results/series_table.h"
@@ -41,6 +42,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
   require(recordText(recordText(text)) == recordText(text));
   require(failureText(failureText(text)) == failureText(text));
   mirevo::readSeriesTable(text);
+  mirevo::readPairsTable(text);
   if (const auto settings = mirevo::parseRestartSettings(text)) {
     require(mirevo::parseRestartSettings(mirevo::formatRestartSettings(*settings)).has_value());
   }

@@ -130,6 +130,44 @@ TEST_F(Restart, GoesOnThoughAnotherTaskWasRunInBetween) {
   EXPECT_EQ(folder_.read("calSimErr.2.dat"), told);
 }
 
+TEST_F(Restart, RunsAreComparedWithTheInitialOneThatWasMadeBefore) {
+  folder_.write("model/run.sh",
+                fmt::format("#!/bin/sh\n{} \"$@\"\ngrep -Eq '^a = *5 *$' parameters.txt || exit 0\n"
+                            "head -3 simulated.csv >cut && mv cut simulated.csv\n",
+                            MIREVO_TEST_MODEL),
+                0755);
+  std::vector<std::string> values = scenarios(12);
+  values[5] = "5, 2, 1";  // which would be perfect if it did not end after two days
+  const std::string fewer = "output measure \"flow\" has 2 pairs, 365 in the initial run, No. 1";
+  const std::string bestIsPoor =
+      "The best evaluation, No. 6, is judged by fewer observations than the initial run: " + fewer;
+  for (const bool mayFail : {false, true}) {
+    writeSetup({.option = 0, .scenarios = values, .slots = 3});
+    if (mayFail) folder_.editSetup("    Aggregation_Method", "    Minimum_Coverage = 0.5\n    Aggregation_Method");
+    std::string expected;
+    for (const char* lastRow : {"", "\n5\t", "\n9\t"}) {
+      const std::string whole = results();
+      if (*lastRow != '\0') folder_.write(resultFile_, whole.substr(0, whole.find(lastRow) + 4));
+      const ProgramResult program = runProgram({setup_});
+      ASSERT_EQ(program.exitCode, 0) << program.error;
+      const std::string found = results() + folder_.read("basin_Pairs.dat");
+      if (*lastRow == '\0') expected = found;
+      EXPECT_EQ(found, expected) << mayFail << lastRow;
+      EXPECT_EQ(occurrences(found, "\n6\tFAILED\t"), mayFail ? 1 : 0);
+      const int named = mayFail ? 0 : 1;
+      EXPECT_EQ(occurrences(found, "\n# Warning: " + bestIsPoor + "\n"), named);
+      EXPECT_EQ(occurrences(found, "\n# Fewer pairs: evaluation 6: " + fewer + "\n"), named);
+      EXPECT_EQ(occurrences(log(), "\nWarning: " + bestIsPoor + "\n"), named);
+      EXPECT_EQ(occurrences(program.error, bestIsPoor), named) << program.error;
+      EXPECT_EQ(occurrences(folder_.read("basin_Report.html"), "No. 6, is judged by fewer"), named);
+      EXPECT_THAT(log(),
+                  HasSubstr("\n   flow: 365 pairs, 0 observations without a simulated value, 2001-01-01 00:00 to "
+                            "2001-12-31 00:00\n      observed "));
+    }
+    removeResults();
+  }
+}
+
 TEST_F(Restart, ARaisedBudgetIsANewSearchOfDds) {
   writeSetup({.includesInitial = false, .maxEvaluations = 20});
   run();

@@ -40,7 +40,8 @@ class RunReporterTest : public ::testing::Test {
   SearchSpace space_{{"k"}, {0.0}, {0.0}, {10.0}, {TransformationType::logarithmic}};
   ResultFile results_;
   FailedRunFile failedRuns_{{folder_ / "calSimErr.dat", folder_ / "s_Failures.dat"}, "s", {"k"}, {"Title"}};
-  RunReporter reporter_{state_, results_, failedRuns_, space_};
+  PairsFile pairs_{folder_ / "s_Pairs.dat", {"Title"}};
+  RunReporter reporter_{state_, results_, failedRuns_, space_, nullptr, &pairs_};
 };
 
 TEST_F(RunReporterTest, TheBestIsTheFirstOfEqualsAndNeverAFailure) {
@@ -92,6 +93,38 @@ TEST_F(RunReporterTest, AggregatesUnknownOnArrivalAreFilledInWhenTheTransformati
     const std::vector<double> values{objective};
     EXPECT_THAT(text, HasSubstr(fmt::format("\t{}\t{}\n", objective, formatReal(aggregator.aggregate(values)))));
   }
+}
+
+TEST_F(RunReporterTest, EvaluationsThatMeetFewerObservationsThanTheInitialRunAreNamed) {
+  const MeasurePairs initial{0, 48, 0, 86400, 2 * 86400, {0.1, 0.5, 1.0}, {-1.0, 1.0 / 3.0, 2.0}};
+  MeasurePairs two = initial;
+  two.count = 2;
+  two.missingCount = 46;
+  const auto arrive = [this](int number, double objective, const MeasurePairs& pairs) {
+    report({.number = number, .objectiveValues = {objective}, .aggregate = objective, .pairs = {pairs}});
+  };
+  arrive(3, 5.0, initial);  // before it is known which run is the initial one
+  arrive(1, 6.0, initial);
+  EXPECT_THAT(reporter_.numbersWithPairs(), testing::IsEmpty());
+  reporter_.pairsFound({1, {"as many as 48"}, {}});
+  EXPECT_EQ(reporter_.fewerPairsOfBest(), "");
+  for (int number = 4; number < 26; ++number) {
+    arrive(number, number == 7 ? 1.0 : 2.0, two);
+    reporter_.pairsFound({0, {}, {{number, 0, 2, 48, "2 of 48"}}});
+  }
+  EXPECT_EQ(reporter_.fewerPairsOfBest(),
+            "The best evaluation, No. 7, is judged by fewer observations than the initial run: 2 of 48");
+  const std::vector<std::string> lines = reporter_.fewerPairsLines();
+  ASSERT_EQ(lines.size(), 21U);
+  EXPECT_EQ(lines.front(), "Fewer pairs: evaluation 4: 2 of 48");
+  EXPECT_EQ(lines.back(), "Fewer pairs: 2 more evaluations, see s_Pairs.dat");
+  EXPECT_THAT(folder_.read("s.log"),
+              AllOf(HasSubstr("as many as 48\n"), HasSubstr("   Evaluation of parameter set No. 7: 2 of 48\n")));
+
+  EXPECT_EQ(pairs_.readEarlier({3, 7, 30}), (PairsByNumber{{3, {initial}}, {7, {two}}}));
+  std::string reason;
+  EXPECT_TRUE(pairs_.finish(reporter_.numbersWithPairs(), reason)) << reason;
+  EXPECT_EQ(pairs_.readEarlier({1, 3, 7}), (PairsByNumber{{1, {initial}}, {7, {two}}}));
 }
 
 TEST_F(RunReporterTest, AnEvaluationReachesResultFileLogProgressAndTheFileOfFailures) {

@@ -24,7 +24,7 @@ RankEvaluator::RankEvaluator(ModelRunner& runner, Job& job, EvaluationObserver& 
     : runner_(runner),
       job_(job),
       observer_(observer),
-      ledger_(observer, failedRuns, earlier, runner.equalMeasures()),
+      ledger_(observer, failedRuns, earlier, runner.equalMeasures(), runner.initialPairs()),
       workers_(static_cast<std::size_t>(job.processCount() - 1)) {}
 
 std::vector<EvaluationResult> RankEvaluator::evaluateParameterSets(std::span<const ParameterSet> sets,
@@ -52,7 +52,7 @@ void RankEvaluator::startNext(int rank) {
     auto failure = runner_.findUnrunnable(ledger_.set(*place));
     if (!failure) {
       job_.send(rank, static_cast<int>(RankMessage::set),
-                encode(SetMessage{ledger_.numberOf(*place), ledger_.set(*place)}));
+                encode(SetMessage{ledger_.numberOf(*place), ledger_.set(*place), ledger_.requiredPairs()}));
       worker(rank).set = *place;
       ledger_.markInitiated(*place);
       return;

@@ -22,7 +22,7 @@ struct Layout<BeginMessage> {
 };
 template <>
 struct Layout<SetMessage> {
-  static void of(auto& archive, auto& message) { archive(message.number, message.set); }
+  static void of(auto& archive, auto& message) { archive(message.number, message.set, message.requiredPairs); }
 };
 template <>
 struct Layout<ReadyMessage> {
@@ -45,8 +45,22 @@ template <>
 struct Layout<EvaluationResult> {
   static void of(auto& archive, auto& result) {
     archive(result.measureValues, result.objectiveValues, result.aggregate, result.simulatedValues, result.failure,
-            result.unusedObservations, result.warnings, result.shownSeries);
+            result.unusedObservations, result.pairs, result.warnings, result.shownSeries);
   }
+};
+template <>
+struct Layout<RequiredPairs> {
+  static void of(auto& archive, auto& required) { archive(required.initialNumber, required.initialCounts); }
+};
+template <>
+struct Layout<MeasurePairs> {
+  static void of(auto& archive, auto& pairs) {
+    archive(pairs.measure, pairs.count, pairs.missingCount, pairs.first, pairs.last, pairs.observed, pairs.simulated);
+  }
+};
+template <>
+struct Layout<ValueSummary> {
+  static void of(auto& archive, auto& values) { archive(values.least, values.mean, values.largest); }
 };
 template <>
 struct Layout<PeriodSeries> {

@@ -84,9 +84,9 @@ void dropFailuresAtEnd(EarlierRun& run) {
 }  // namespace
 
 RestartFiles restartFiles(const std::string& filePrefix, const ResultFileNames& names) {
-  return {runFilePath(filePrefix, names.results), runFilePath(filePrefix, names.restart),
+  return {runFilePath(filePrefix, names.results),         runFilePath(filePrefix, names.restart),
           runFilePath(filePrefix, names.simulatedValues), runFilePath(filePrefix, names.record),
-          runFilePath(filePrefix, names.failures)};
+          runFilePath(filePrefix, names.failures),        runFilePath(filePrefix, names.pairs)};
 }
 
 std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunConfig& config,
@@ -119,7 +119,7 @@ std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunCon
 }
 
 std::map<int, EarlierEvaluations::Record> earlierRecords(
-    EarlierRun& run, const std::map<int, EvaluationFailure>& failures,
+    EarlierRun& run, const std::map<int, EvaluationFailure>& failures, const PairsByNumber& pairs,
     std::optional<std::map<int, std::vector<double>>> simulatedValues) {
   if (simulatedValues) {
     const auto isIncomplete = [&](const ResultRow& row) { return row.ok && simulatedValues->count(row.number) == 0; };
@@ -132,6 +132,7 @@ std::map<int, EarlierEvaluations::Record> earlierRecords(
     record.result.number = row.number;
     record.result.measureValues = row.measures;
     record.result.objectiveValues = row.objectives;
+    if (const auto found = pairs.find(row.number); found != pairs.end()) record.result.pairs = found->second;
     if (!row.ok) {
       record.result.failure = failures.at(row.number);
     } else if (simulatedValues) {

@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "evaluation/earlier_evaluations.h"
+#include "run/results/pairs_file.h"
 #include "run/results/result_table.h"
 #include "run/results/run_record.h"
 #include "run/setup/run_config.h"
@@ -19,6 +20,7 @@ struct RestartFiles {
   std::string simulatedValues;  ///< if the task uses them
   std::string record;
   std::string failures;
+  std::string pairs;
 };
 
 /// The paths of these files; `filePrefix` is folder and name of the setup.
@@ -41,9 +43,10 @@ std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunCon
                                          const ResultColumns& columns, std::optional<RunRecord> record);
 
 /// The evaluations of an earlier run by number. `failures`: the reasons of the failed ones. `simulatedValues`: those of
-/// the others, if the task uses them; evaluations without them are left out, and therefore repeated.
+/// the others, if the task uses them; evaluations without them are left out, and therefore repeated. `pairs`: of the
+/// initial run and of runs that have fewer.
 std::map<int, EarlierEvaluations::Record> earlierRecords(
-    EarlierRun& run, const std::map<int, EvaluationFailure>& failures,
+    EarlierRun& run, const std::map<int, EvaluationFailure>& failures, const PairsByNumber& pairs,
     std::optional<std::map<int, std::vector<double>>> simulatedValues);
 
 /// Writes the settings of this run. Throws FatalError.

@@ -63,6 +63,7 @@ RunResults::RunResults(const RunConfig& config, const SearchSpace& space, const 
       files_(restartFiles(filePrefix, names_)),
       failedRuns_({pathBeside(filePrefix, run_files::kFailedRuns), files_.failures}, config.setupName, space.names,
                   tableHead_),
+      pairs_(files_.pairs, tableHead_),
       record_(files_.record, tableHead_) {
   if (config.task && config.restart != RestartMode::startAfresh) {
     auto record = record_.readEarlier();
@@ -105,8 +106,8 @@ std::vector<std::string> RunResults::bandPaths(const RunConfig& config) const {
 
 std::vector<RunFile> RunResults::dataFiles(const RunConfig& config) {
   const ResultFileNames& names = namesOf(config);
-  std::vector<RunFile> files{names.results, names.restart,  names.simulatedValues,
-                             names.record,  names.failures, run_files::kSeries};
+  std::vector<RunFile> files{names.results,  names.restart, names.simulatedValues, names.record,
+                             names.failures, names.pairs,   run_files::kSeries};
   files.insert(files.end(), names.tables.begin(), names.tables.end());
   return files;
 }
@@ -156,7 +157,8 @@ void RunResults::keepEarlierFiles(const RunConfig& config, RunLog& log) const {
   if (const std::string kept = keepEarlierResults(files_.results, config.setupFile, log); !kept.empty()) {
     log.line("The results of the earlier run were kept as " + kept);
   }
-  for (const std::string& path : {files_.settings, files_.simulatedValues, files_.record, files_.failures}) {
+  for (const std::string& path :
+       {files_.settings, files_.simulatedValues, files_.record, files_.failures, files_.pairs}) {
     keepEarlierResults(path, config.setupFile, log);
   }
   for (const RunFile& table : names_.tables) {
@@ -202,7 +204,8 @@ void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggreg
   std::optional<std::map<int, std::vector<double>>> values;
   if (simulatedValues_) values = simulatedValues_->takeUp(succeeded);
   const std::size_t withoutValues = values ? succeeded.size() - values->size() : 0;
-  auto records = earlierRecords(run, failures, std::move(values));
+  PairsByNumber pairs = pairs_.readEarlier(succeeded);
+  auto records = earlierRecords(run, failures, pairs, std::move(values));
 
   RunRecord record = recordOf(config, log);
   record.started = run.started;
@@ -212,6 +215,7 @@ void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggreg
   table_.open(files_.results, headLines(config, record), columns_, run.rows);
   // Only now: were the run killed before, rows that are gone from the table would still be in it.
   failedRuns_.continueBehind(earlier.rows, failedSets);
+  pairs_.continueBehind(std::move(pairs));
   const std::string failedFolders = runFilePath(processFolderPrefix(config), run_files::kFailedFolder);
   for (const std::string& problem : removeFailedRunFolders(failedFolders, failed)) log.warning(problem);
   // With a raised budget in it, rows that the smaller one had ended would be taken for the search's.

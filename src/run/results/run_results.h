@@ -14,6 +14,7 @@
 #include "parameters/search_space.h"
 #include "run/progress/run_log.h"
 #include "run/results/failed_run_file.h"
+#include "run/results/pairs_file.h"
 #include "run/results/restart.h"
 #include "run/results/result_file.h"
 #include "run/results/run_record_file.h"
@@ -54,6 +55,7 @@ class RunResults final {
 
   ResultFile& table() { return table_; }
   FailedRunFile& failedRuns() { return failedRuns_; }
+  PairsFile& pairs() { return pairs_; }
   RunRecordFile& record() { return record_; }
   /// nullptr where the task does not work with simulated values.
   SimulatedValuesFile* simulatedValues() { return simulatedValues_ ? &*simulatedValues_ : nullptr; }
@@ -80,6 +82,7 @@ class RunResults final {
   ResultFile table_;
   FileLock failedRunsLock_;  ///< on `calSimErr.dat`
   FailedRunFile failedRuns_;
+  PairsFile pairs_;
   RunRecordFile record_;
   std::optional<SimulatedValuesFile> simulatedValues_;
   std::optional<EarlierEvaluations> earlierEvaluations_;

@@ -60,23 +60,6 @@ void appendCell(std::string& text, float value) {
   }
 }
 
-std::optional<std::int64_t> readTime(std::string_view text) {
-  constexpr std::string_view kPattern = "0000-00-00T00:00:00";
-  if (text.size() != kPattern.size()) return std::nullopt;
-  for (std::size_t i = 0; i < text.size(); ++i) {
-    const bool isDigit = text[i] >= '0' && text[i] <= '9';
-    if (kPattern[i] == '0' ? !isDigit : text[i] != kPattern[i]) return std::nullopt;
-  }
-  constexpr std::array<std::size_t, 6> kStarts{0, 5, 8, 11, 14, 17};
-  DateRecord date{};
-  for (std::size_t field = 0; field < kStarts.size(); ++field) {
-    const char* start = text.data() + kStarts[field];
-    std::from_chars(start, start + (field == 0 ? 4 : 2), date[field]);
-  }
-  if (!isValidDate(date) || date[date_field::kSecond] > 59) return std::nullopt;
-  return secondNumber(date);
-}
-
 std::optional<float> readCell(std::string_view text) {
   if (text == "NaN") return std::numeric_limits<float>::quiet_NaN();
   float value = 0.0F;
@@ -130,7 +113,7 @@ void readHeadLine(std::string_view line, SeriesTable& table) {
 void readRow(std::string_view line, SeriesTable& table) {
   const std::vector<std::string_view> cells = splitAt(line, '\t');
   if (cells.size() != 5) return;
-  const auto second = readTime(cells[1]);
+  const auto second = readIsoTime(cells[1]);
   const auto observed = readCell(cells[2]);
   const auto initial = readCell(cells[3]);
   const auto best = readCell(cells[4]);
@@ -147,6 +130,23 @@ void readRow(std::string_view line, SeriesTable& table) {
 }
 
 }  // namespace
+
+std::optional<std::int64_t> readIsoTime(std::string_view text) {
+  constexpr std::string_view kPattern = "0000-00-00T00:00:00";
+  if (text.size() != kPattern.size()) return std::nullopt;
+  for (std::size_t i = 0; i < text.size(); ++i) {
+    const bool isDigit = text[i] >= '0' && text[i] <= '9';
+    if (kPattern[i] == '0' ? !isDigit : text[i] != kPattern[i]) return std::nullopt;
+  }
+  constexpr std::array<std::size_t, 6> kStarts{0, 5, 8, 11, 14, 17};
+  DateRecord date{};
+  for (std::size_t field = 0; field < kStarts.size(); ++field) {
+    const char* start = text.data() + kStarts[field];
+    std::from_chars(start, start + (field == 0 ? 4 : 2), date[field]);
+  }
+  if (!isValidDate(date) || date[date_field::kSecond] > 59) return std::nullopt;
+  return secondNumber(date);
+}
 
 std::vector<std::string> seriesNames(std::span<const OutputMeasure> measures, std::span<const std::size_t> shown) {
   std::vector<std::string> names;

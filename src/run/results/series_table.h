@@ -44,6 +44,9 @@ struct SeriesTable {
   bool isOf(std::string_view otherTask) const { return task.empty() || task == otherTask; }
 };
 
+/// The inverse of isoTime(); empty for any other text.
+std::optional<std::int64_t> readIsoTime(std::string_view text);
+
 /// The names of the measures with these 0-based indices in the table, made unique.
 std::vector<std::string> seriesNames(std::span<const OutputMeasure> measures, std::span<const std::size_t> shown);
 

@@ -88,7 +88,8 @@ std::string keepEarlierResults(const std::string& path, const std::string& setup
   const auto head = readFileHead(kept, reason);
   const std::string_view earlier = setupNamedIn(head ? *head : std::string_view());
   if (!head) {
-    log.warning(fmt::format("{}, kept from an earlier run: {}. Whether it is of this setup is not known", kept, reason));
+    log.warning(
+        fmt::format("{}, kept from an earlier run: {}. Whether it is of this setup is not known", kept, reason));
   } else if (!earlier.empty() && fileNameOf(earlier) != fileNameOf(setupFile)) {
     log.warning(fmt::format(
         "{} held results of another setup, {}, which shares this name with {}. They were kept as {}. Give one of the "

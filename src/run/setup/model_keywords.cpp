@@ -194,7 +194,15 @@ const SettingSection<RunConfig>& judgementSection() {
              .codes = kAggregationMethodNames,
              .refusal = "Error: Objective function aggregation method invalid",
              .meaning = "How objective functions are put on one scale before they are added up: 0 not at all, 1 common "
-                        "distance scale, 2 common probability scale; 3 makes every aggregate 0."})}}};
+                        "distance scale, 2 common probability scale; 3 makes every aggregate 0."}),
+        setting<&RunConfig::minimumCoverage>(
+            {.name = "Minimum_Coverage",
+             .defaultValue = "0",
+             .range = kFraction,
+             .refusal = "Error: Minimum coverage invalid",
+             .meaning = "Least share, of the pairs of simulated and observed values that the initial run has of a "
+                        "measure, with which a model run counts; with a smaller share it is a failed run. 0: no run "
+                        "fails for lack of pairs, as long as it has any."})}}};
   return section;
 }
 

@@ -30,7 +30,7 @@ class RankEvaluatorTest : public EvaluationTest {
     const double measure = running_.at(rank) - 1.0;
     // The aggregate is the worker's own, which counts for nothing.
     const EvaluationResult result{
-        .measureValues = {measure}, .objectiveValues = {std::abs(measure)}, .aggregate = -99.0};
+        .measureValues = {measure}, .objectiveValues = {std::abs(measure)}, .aggregate = -99.0, .pairs = pairs_};
     job_.deliver(rank, RankMessage::result, encode(ResultMessage{result}));
     running_.erase(rank);
   }
@@ -48,7 +48,8 @@ class RankEvaluatorTest : public EvaluationTest {
 
   FakeLauncher launcher_;
   FakeJob job_{3};
-  std::map<int, double> running_;  ///< the set's value, by rank
+  std::map<int, double> running_;    ///< the set's value, by rank
+  std::vector<MeasurePairs> pairs_;  ///< of each answer
   std::unique_ptr<RankEvaluator> master_;
 };
 
@@ -79,6 +80,22 @@ TEST_F(RankEvaluatorTest, WhoeverIsFreeGetsTheNextSetAndResultsStandInTheOrderOf
   EXPECT_EQ(next.at(0).number, 6);
   EXPECT_EQ(job_.sent.back().rank, 1);
   EXPECT_EQ(launcher_.starts, 0);
+}
+
+TEST_F(RankEvaluatorTest, WorkersWaitForTheInitialRunWhosePairsTheirsNeed) {
+  description_.minimumCoverage = 0.5;
+  pairs_ = {{.count = 5}};
+  RankEvaluator& master = makeMaster();
+  becomeReady(1);
+  becomeReady(2);
+  answerLargestFirst();
+  evaluate(master, {2.0, 4.0, 6.0});
+  std::vector<std::pair<int, std::vector<std::size_t>>> required;
+  for (const Message& message : job_.sent) {
+    required.emplace_back(message.rank, decodeSet(message.content).requiredPairs.initialCounts);
+  }
+  EXPECT_THAT(required, ElementsAre(testing::Pair(1, IsEmpty()), testing::Pair(1, ElementsAre(5)),
+                                    testing::Pair(2, ElementsAre(5))));
 }
 
 TEST_F(RankEvaluatorTest, FailedRunsOfAllWorkersCountTogether) {

@@ -1,0 +1,48 @@
+#pragma once
+
+#include <map>
+#include <set>
+#include <span>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "evaluation/evaluation_result.h"
+#include "run/results/record_file.h"
+
+namespace mirevo {
+
+/// Pairs by the number of their evaluation.
+using PairsByNumber = std::map<int, std::vector<MeasurePairs>>;
+
+/// The pairs of the initial run and of the runs that have fewer, `<setup>_Pairs.dat` and its like: for programs, and
+/// for a restart, which compares further runs with the initial one. The file appears with the first pairs.
+class PairsFile final {
+ public:
+  /// `tableHead` is over the table, for people.
+  PairsFile(std::string path, std::vector<std::string> tableHead);
+
+  /// What an interrupted run has left of the evaluations with those numbers. Throws FatalError if the file cannot be
+  /// read.
+  PairsByNumber readEarlier(const std::set<int>& numbers) const;
+  /// Continues the file behind those pairs. Throws FatalError.
+  void continueBehind(PairsByNumber earlier);
+  /// Throws FatalError when they cannot be written.
+  void add(int number, std::span<const MeasurePairs> pairs);
+  /// At the end of a run: leaves the evaluations with those numbers, in their order, or all if no number is given.
+  /// False, with the system's reason, when that fails.
+  bool finish(const std::set<int>& numbers, std::string& reason);
+
+  const std::string& path() const { return path_; }
+
+ private:
+  std::string path_;
+  std::vector<std::string> tableHead_;
+  PairsByNumber pairs_;
+  RecordFile file_;
+};
+
+/// The rows of the table's text. Any text is taken; what is no row is left out.
+PairsByNumber readPairsTable(std::string_view text);
+
+}  // namespace mirevo
