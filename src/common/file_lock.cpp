@@ -167,7 +167,9 @@ void FileLock::removeFile() const noexcept {
     lock = lockOf(F_WRLCK, kWhole);
     if (::fcntl(descriptor_, F_OFD_SETLK, &lock) != 0 || !isAt(path_, descriptor_)) return;
   }
-  if (descriptor_ >= 0 || socket_ >= 0) ::unlink(path_.c_str());
+  struct stat status {};
+  const bool isOwn = ::lstat(path_.c_str(), &status) == 0 && S_ISREG(status.st_mode);  // and no link of the user's
+  if (isOwn && (descriptor_ >= 0 || socket_ >= 0)) ::unlink(path_.c_str());
 }
 
 void FileLock::release() {

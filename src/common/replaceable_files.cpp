@@ -55,6 +55,24 @@ bool isFolderOfRun(const std::string& path, const RunFile& file, std::string& fa
   return false;
 }
 
+/// What is neither a file nor a folder, for a message; empty where it is one of them, is nothing or cannot be examined.
+std::string kindOf(const std::string& path) {
+  std::error_code failed;
+  switch (std::filesystem::symlink_status(path, failed).type()) {
+    case std::filesystem::file_type::symlink:
+      return fmt::format("a symbolic link to {}", std::filesystem::read_symlink(path, failed).string());
+    case std::filesystem::file_type::fifo:
+      return "a pipe";
+    case std::filesystem::file_type::socket:
+      return "a socket";
+    case std::filesystem::file_type::block:
+    case std::filesystem::file_type::character:
+      return "a device";
+    default:
+      return {};
+  }
+}
+
 std::string unreadable(const std::string& reason) {
   return fmt::format("It cannot be read, and may not be from a run of this program: {}", reason);
 }
@@ -70,6 +88,10 @@ std::string whyNotReplaceable(const std::string& path, const RunFile& file) {
   using namespace run_files;
   constexpr std::string_view kOfAnother =
       "It is not from a run of this program, which would rename or remove it. Move it, or give the setup another name.";
+  if (const std::string kind = kindOf(path); !kind.empty()) {
+    return fmt::format(
+        "It is {}; a run writes files and folders of its own. Remove it, or give the setup another name.", kind);
+  }
   const bool isFolder = file == kSavedFolder || file == kFailedFolder || file == kProcessFolder;
   std::error_code failed;
   const auto type = std::filesystem::symlink_status(path, failed).type();

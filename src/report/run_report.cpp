@@ -14,6 +14,7 @@
 #include "common/clock.h"
 #include "common/fatal_error.h"
 #include "common/files.h"
+#include "common/replaceable_files.h"
 #include "common/run_files.h"
 #include "common/version.h"
 #include "evaluation/chosen_evaluations.h"
@@ -302,7 +303,8 @@ bool writeReport(const RunConfig& config, const std::string& filePrefix, std::st
     const std::optional<ReportData> data = buildReport(config, filePrefix, reason);
     if (!data) return false;
     const std::string path = runFilePath(filePrefix, run_files::kReport);
-    if (replaceFile(path, reportPage(reportPageTemplate(), *data), reason)) return true;
+    reason = whyNotReplaceable(path, run_files::kReport);
+    if (reason.empty() && replaceFile(path, reportPage(reportPageTemplate(), *data), reason)) return true;
     reason = path + ": " + reason;
   } catch (const FatalError& error) {
     reason = error.message() + "\n" + error.detail();

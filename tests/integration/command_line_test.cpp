@@ -1,3 +1,5 @@
+#include <sys/stat.h>
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -106,14 +108,29 @@ TEST(Results, WhatIsNotOfARunIsNeitherRenamedNorRemoved) {
     EXPECT_EQ(folder.read(name), "time,flow\n");
     std::filesystem::remove_all(folder / taken);
   }
+  for (const char* name : {"basin.log", "basin.dat", "basin_Simulated.bin", "basin_Series.dat", "calSimErr.dat",
+                           "basin_Saved", "basin_Process1"}) {
+    for (const auto& [isLink, text] : {std::pair{true, "symbolic link to another.dat"}, {false, "a pipe"}}) {
+      const std::string path = folder / name;
+      std::filesystem::remove(path);
+      ASSERT_EQ(isLink ? ::symlink("another.dat", path.c_str()) : ::mkfifo(path.c_str(), 0600), 0);
+      const ProgramResult run = runProgram({setup});
+      EXPECT_EQ(run.exitCode, 1) << name;
+      EXPECT_THAT(run.error, AllOf(HasSubstr(path), HasSubstr(text)));
+      EXPECT_FALSE(folder.exists("another.dat"));
+      std::filesystem::remove(path);
+    }
+  }
   folder.write("basin_Failed7/notes.txt", "the user's");
+  std::filesystem::remove(folder / "basin._spi_");
+  std::filesystem::create_symlink(folder.write("another.dat", "the user's"), folder / "basin._spi_");
   folder.useScript("rm -f *.log");                   // the mark of its process folder stays
   for (const char* cut : {"", "# Small test ba"}) {  // by a full disk
     folder.write("basin.dat", cut);
     EXPECT_EQ(runProgram({setup}).exitCode, 1);
     EXPECT_THAT(folder.read("basin.dat"), HasSubstr("\n1\tFAILED\t"));
   }
-  EXPECT_EQ(folder.read("basin_Failed7/notes.txt"), "the user's");
+  for (const char* name : {"basin_Failed7/notes.txt", "another.dat"}) EXPECT_EQ(folder.read(name), "the user's");
 }
 
 }  // namespace

@@ -4,6 +4,8 @@
 #include <cerrno>
 #include <cstring>
 #include <fcntl.h>
+#include <filesystem>
+#include <system_error>
 #include <unistd.h>
 #include <utility>
 
@@ -61,9 +63,11 @@ std::string ProgressReporter::progressInit(std::string_view runFileName, std::st
   } else if (destination == "STDOUT") {
     messageUnit_ = kStandardOutput;
   } else {
+    std::error_code ignored;
+    if (std::filesystem::is_symlink(messageFile(), ignored)) std::filesystem::remove(messageFile(), ignored);
     // Without O_NONBLOCK opening a pipe would wait for its reader.
-    messageUnit_ =
-        ::open(messageFile().c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_APPEND | O_CLOEXEC | O_NONBLOCK, 0666);
+    messageUnit_ = ::open(messageFile().c_str(),
+                          O_WRONLY | O_CREAT | O_TRUNC | O_APPEND | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK, 0666);
     if (messageUnit_ >= 0) {
       signalState.messageFileDescriptor = messageUnit_;
     } else {

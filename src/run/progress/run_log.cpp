@@ -21,7 +21,7 @@ RunLog::~RunLog() {
 
 bool RunLog::open(const std::string& path, std::string& reason) {
   close();
-  const int descriptor = ::open(path.c_str(), O_RDWR | O_CREAT | O_TRUNC | O_APPEND | O_CLOEXEC, 0666);
+  const int descriptor = ::open(path.c_str(), O_RDWR | O_CREAT | O_TRUNC | O_APPEND | O_CLOEXEC | O_NOFOLLOW, 0666);
   if (descriptor < 0) {
     reason = std::strerror(errno);
     return false;

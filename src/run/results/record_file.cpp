@@ -61,7 +61,7 @@ void RecordFile::openWith(const std::string& path, int flags) {
   path_ = path;
   size_ = 0;
   failed_ = false;
-  descriptor_ = ::open(path.c_str(), O_RDWR | O_CLOEXEC | flags, 0666);
+  descriptor_ = ::open(path.c_str(), O_RDWR | O_CLOEXEC | O_NOFOLLOW | flags, 0666);
   if (descriptor_ < 0) fatalError("Error: Unable to open " + path, std::strerror(errno));
 }
 

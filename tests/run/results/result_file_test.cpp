@@ -1,5 +1,7 @@
 #include "run/results/result_file.h"
 
+#include <csignal>
+#include <sys/resource.h>
 #include <tuple>
 
 #include <gmock/gmock.h>
@@ -80,8 +82,14 @@ TEST_F(ResultFileTest, RowsStayWhereTheyAreWhenTheyCannotBePutInOrder) {
 }
 
 TEST_F(ResultFileTest, AFullDiskIsReportedOnceWithItsReason) {
-  std::filesystem::create_symlink("/dev/full", path_);
-  EXPECT_EQ(refusalOf([this] { open(); }), "Error: Unable to write to " + path_ + "\nNo space left on device");
+  ::signal(SIGXFSZ, SIG_IGN);
+  rlimit limit{};
+  ASSERT_EQ(::getrlimit(RLIMIT_FSIZE, &limit), 0);
+  const rlimit none{0, limit.rlim_max};
+  ASSERT_EQ(::setrlimit(RLIMIT_FSIZE, &none), 0);
+  const std::string refusal = refusalOf([this] { open(); });
+  ::setrlimit(RLIMIT_FSIZE, &limit);
+  EXPECT_EQ(refusal, "Error: Unable to write to " + path_ + "\nFile too large");
   add(success(1, 1, 1), 1);
   EXPECT_FALSE(results_.finish({}, reason_));
 }
