@@ -2,6 +2,8 @@
 
 #include <array>
 
+#include <fmt/core.h>
+
 namespace mirevo {
 
 Utf8Character firstCharacter(std::string_view text) {
@@ -33,6 +35,15 @@ std::size_t characterCount(std::string_view text) {
   std::size_t count = 0;
   for (; !text.empty(); ++count) text.remove_prefix(firstCharacter(text).bytes);
   return count;
+}
+
+std::string quoted(std::string_view text) {
+  constexpr std::size_t kMostQuoted = 200;
+  const std::size_t count = text.size() > kMostQuoted ? characterCount(text) : 0;
+  if (count <= kMostQuoted) return std::string(text);
+  std::string_view rest = text;
+  for (std::size_t i = 0; i < kMostQuoted; ++i) rest.remove_prefix(firstCharacter(rest).bytes);
+  return fmt::format("{}... ({} characters)", text.substr(0, text.size() - rest.size()), count);
 }
 
 std::string withValidUtf8(std::string_view text) {

@@ -24,6 +24,9 @@ bool isValidUtf8(std::string_view text);
 /// How many characters the text has; each invalid byte counts as one.
 std::size_t characterCount(std::string_view text);
 
+/// A text for a message: whole, or of a long one the first 200 characters and how many there are.
+std::string quoted(std::string_view text);
+
 /// The text with U+FFFD in place of each invalid byte.
 std::string withValidUtf8(std::string_view text);
 

@@ -8,6 +8,7 @@
 
 #include "common/fatal_error.h"
 #include "common/text.h"
+#include "common/utf8.h"
 #include "parameters/dependency_order.h"
 #include "platform/equations/expression_evaluator.h"
 
@@ -147,7 +148,7 @@ std::optional<ParameterFailure> ParameterModel::Implementation::assignDependentP
     if (!std::isfinite(values_[i])) {
       return ParameterFailure{ParameterFailure::Kind::equationNotFinite,
                               fmt::format("the equation of parameter \"{}\" gives {}: {}", names_[i],
-                                          formatReal(values_[i]), trim(parameters_[i].equation))};
+                                          formatReal(values_[i]), quoted(trim(parameters_[i].equation)))};
     }
   }
   return std::nullopt;

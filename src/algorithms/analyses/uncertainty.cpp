@@ -71,9 +71,9 @@ const SettingSection<UncertaintySection>& uncertaintySection() {
                                      .refusal = "Error: Invalid uncertainty estimation type selection",
                                      .meaning = "How the parameter sets are drawn."}),
         setting<UncertaintySection>([](auto& s) -> auto& { return s.settings.sampleSize; },
-                                    {.name = "Sample_Size",
+                                    {.name = kSampleSizeKeyword,
                                      .range = from(2),
-                                     .refusal = "Error: Sample size in uncertainty estimation invalid",
+                                     .refusal = kSampleSizeRefusal,
                                      .unit = "model runs",
                                      .meaning = "Parameter sets that are drawn."}),
         setting<UncertaintySection>(

@@ -34,6 +34,9 @@ struct UncertaintySettings {
   bool redrawsInfeasible = false;              ///< whether sets that cannot be run are drawn again
 };
 
+inline constexpr std::string_view kSampleSizeKeyword = "Sample_Size";
+inline constexpr std::string_view kSampleSizeRefusal = "Error: Sample size in uncertainty estimation invalid";
+
 /// The section UNCERTAINTY_ESTIMATION, and the seed of the run, which the initial sample sets, too.
 struct UncertaintySection {
   UncertaintySettings& settings;

@@ -187,7 +187,8 @@ const SearchFacts& PseMethod::facts() const {
                                       .runsInParallel = true,
                                       .usesSurrogate = true,
                                       .drawsInitialSample = true,
-                                      .needsRanges = true};
+                                      .needsRanges = true,
+                                      .populationKeywords = kPopulationKeyword};
   return kFacts;
 }
 

@@ -157,7 +157,8 @@ const SearchFacts& SceMethod::facts() const {
                                       .usesSurrogate = true,
                                       .drawsInitialSample = true,
                                       .needsRanges = true,
-                                      .runsAtOnceUnderMpi = "one proposal of each complex"};
+                                      .runsAtOnceUnderMpi = "one proposal of each complex",
+                                      .populationKeywords = "No_Complexes times No_Points_Complex"};
   return kFacts;
 }
 

@@ -27,6 +27,7 @@ struct SearchFacts {
   bool needsRanges = false;         ///< it uses the range of each parameter, which must not be empty
   /// Of a search that does not fill several slots: what a job of several processes runs at once all the same.
   std::string_view runsAtOnceUnderMpi = {};
+  std::string_view populationKeywords = {};  ///< "Population_Size"; empty if it has no population
 };
 
 /// A keyword whose value is small for the number of variable parameters: the search may end early.

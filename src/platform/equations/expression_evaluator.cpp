@@ -30,7 +30,7 @@ std::string describe(std::string_view equation, const EquationError& error) {
 }
 
 [[noreturn]] void failCreation(std::string_view equation, std::string_view detail) {
-  fatalError(fmt::format("Error: Unable to create the expression {} in equation parser", equation), detail);
+  fatalError(fmt::format("Error: Unable to create the expression {} in equation parser", quoted(equation)), detail);
 }
 
 /// A parser that knows the functions of the equation language and nothing else.
@@ -152,14 +152,15 @@ bool ExpressionEvaluator::NameAppearsIn(std::string_view equation, std::string_v
   const auto expression = compile(equation);
   const std::ptrdiff_t index = implementation_->names.find(name);
   if (index < 0) {
-    fatalError(fmt::format("Error: In the check of {}appear in expression {}", trimTrailing(name), trim(equation)),
-               "no parameter has this name");
+    fatalError(
+        fmt::format("Error: In the check of {}appear in expression {}", trimTrailing(name), quoted(trim(equation))),
+        "no parameter has this name");
   }
   return expression->names(static_cast<std::size_t>(index));
 }
 
 void failEvaluation(std::string_view equation) {
-  fatalError(fmt::format("Error: Unable to evaluate the expression {} in equation parser", trim(equation)));
+  fatalError(fmt::format("Error: Unable to evaluate the expression {} in equation parser", quoted(trim(equation))));
 }
 
 }  // namespace mirevo

@@ -175,8 +175,13 @@ bool PosixProcessLauncher::initialise(const LauncherSettings& settings) {
 
 void PosixProcessLauncher::lockFolders(const LauncherSettings& settings) {
   const std::string& prefix = settings.processFolderPrefix;
-  std::error_code failed;  // noticed when the first folder is made
-  std::filesystem::create_directories(std::filesystem::path(prefix).parent_path(), failed);
+  const std::filesystem::path parent = std::filesystem::path(prefix).parent_path();
+  std::error_code failed;
+  std::filesystem::create_directories(parent, failed);
+  if (failed) {
+    fatalError(fmt::format("Unable to create {}, the folder of the process folders (ProcessFolder): {}",
+                           parent.string(), failed.message()));
+  }
   const FileLock::Range folders{settings.firstFolderNumber, settings.slotCount};
   if (!lock_.take(processLockPath(prefix), folders, kLockPatienceSeconds)) {
     fatalError(processFoldersInUse(prefix, lock_.holder()));

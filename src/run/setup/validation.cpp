@@ -1,5 +1,7 @@
 #include "run/setup/validation.h"
 
+#include <cmath>
+
 #include <fmt/core.h>
 
 #include "common/calendar.h"
@@ -47,10 +49,17 @@ std::optional<SettingRefusal> validateParameterDefinition(const ModelParameter& 
   if (!names.insert(parameter.name).second) {
     return refuseRepeated("Error: Invalid parameter name", parameter.name, "Parameter_Name", "parameter");
   }
+  if (parameter.parameterType != ParameterType::variable) return std::nullopt;
+  if (!std::isfinite(parameter.upperBound - parameter.lowerBound)) {
+    return SettingRefusal{
+        "Error: Bounds too far apart for parameter " + parameter.name, "Upper_Bound",
+        fmt::format("expected a difference from Lower_Bound = {} that a number can hold (1.79e308 at most), found {}",
+                    parameter.lowerBound, parameter.upperBound)};
+  }
   // Only the lower bound matters: the upper bound and the initial value are not below it.
-  const bool hasLogarithm =
-      parameter.transformationType != TransformationType::logarithmic || parameter.lowerBound > 0.0;
-  if (parameter.parameterType != ParameterType::variable || hasLogarithm) return std::nullopt;
+  if (parameter.transformationType != TransformationType::logarithmic || parameter.lowerBound > 0.0) {
+    return std::nullopt;
+  }
   return SettingRefusal{
       "Error: Invalid parameter transformation for parameter " + parameter.name, "Lower_Bound",
       fmt::format("expected a value greater than 0 for a logarithmic parameter, found {}", parameter.lowerBound)};

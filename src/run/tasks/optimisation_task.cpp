@@ -121,7 +121,7 @@ void OptimisationTask::read(const TaskReading& reading) {
   reading.requireScales(method->evaluatesSample(initialSample));
 
   const SetupSection stops = section.open(nameInside(stoppingSection().row));
-  readStopping(stops);
+  readStopping(stops, reading.variableCount);
   if (surrogateUse == SurrogateUse::yes) readSurrogate(reading, section, stops);
 }
 
@@ -145,7 +145,7 @@ void OptimisationTask::warnOfOneLoop(const SetupSection& section) const {
   section.warn("No_Loops_Convergence", "with 1 the search ends after its first loop, use at least 2");
 }
 
-void OptimisationTask::readStopping(const SetupSection& section) {
+void OptimisationTask::readStopping(const SetupSection& section, std::size_t variableCount) {
   const BoundSection bound(stoppingSection(), stopping);
   section.take(bound);
   if (const std::string_view refusal = method->budgetRefusal(); !refusal.empty() && stopping.maxEvaluations < 1) {
@@ -154,6 +154,11 @@ void OptimisationTask::readStopping(const SetupSection& section) {
   section.check(bound);
   warnOfOneLoop(section);
   const std::int64_t sampleSize = method->populationSize();
+  if (const auto tooMany = tooManySets(std::min<std::int64_t>(sampleSize, stopping.maxEvaluations), variableCount)) {
+    section.refuse("Error: Unable to allocate memory in MIREVO setup", kBudgetKeyword,
+                   fmt::format("{}, found {} = {} and Max_No_Evaluations = {}", *tooMany,
+                               method->facts().populationKeywords, sampleSize, stopping.maxEvaluations));
+  }
   if (sampleSize <= stopping.maxEvaluations) return;
   section.warn(kBudgetKeyword, fmt::format("the initial sample of {} sets is cut to {}, and no search follows",
                                            sampleSize, stopping.maxEvaluations));

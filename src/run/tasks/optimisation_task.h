@@ -40,7 +40,7 @@ class OptimisationTask final : public Task {
   /// Whether a surrogate model assists the search.
   bool usesSurrogate() const { return surrogateUse == SurrogateUse::yes && method->facts().usesSurrogate; }
   void readMethod(const TaskReading& reading, const SetupSection& section) const;
-  void readStopping(const SetupSection& section);
+  void readStopping(const SetupSection& section, std::size_t variableCount);
   void warnOfOneLoop(const SetupSection& section) const;
   void readSurrogate(const TaskReading& reading, const SetupSection& section, const SetupSection& stoppingSection);
   void warnOfGivenSets(const TaskContext& context, const SearchProblem& problem) const;

@@ -1,6 +1,18 @@
 #include "run/tasks/task.h"
 
+#include <algorithm>
+
+#include <fmt/core.h>
+
 namespace mirevo {
+
+std::optional<std::string> tooManySets(std::int64_t sets, std::size_t n) {
+  constexpr std::int64_t kMostSets = 10'000'000;
+  constexpr std::int64_t kMostValues = 100'000'000;  // 800 MB
+  const std::int64_t most = std::min(kMostSets, kMostValues / std::max(static_cast<std::int64_t>(n), std::int64_t{1}));
+  if (sets <= most) return std::nullopt;
+  return fmt::format("expected at most {} sets of {} parameters, as all are in memory", most, n);
+}
 
 std::vector<std::string> Task::summaryLines(const SearchSpace& /*space*/) const {
   return {};

@@ -44,6 +44,9 @@ struct TaskReading {
   std::function<void(bool hasInitialSample)> requireScales;
 };
 
+/// What was expected instead of so many sets of n parameters, all of which are in memory; empty if they fit into it.
+std::optional<std::string> tooManySets(std::int64_t sets, std::size_t n);
+
 /// What a task uses when it runs.
 struct TaskContext {
   const SearchSpace& space;

@@ -59,6 +59,9 @@ void UncertaintyTask::read(const TaskReading& reading) {
   const SetupSection section = reading.target.open("UNCERTAINTY_ESTIMATION");
   UncertaintySection filled{settings, randomSeed};
   section.read(uncertaintySection(), filled);
+  if (const auto tooMany = tooManySets(settings.sampleSize, reading.variableCount)) {
+    section.refuse(kSampleSizeRefusal, kSampleSizeKeyword, fmt::format("{}, found {}", *tooMany, settings.sampleSize));
+  }
   if (const auto surplus = section.itemBeyond("PARAMETER_", reading.variableCount)) {
     surplus->warn(surplus->name(),
                   fmt::format("not read: PARAMETER_n is the distribution of the n-th of the {} variable parameters. "

@@ -285,7 +285,7 @@ TEST_F(PosixProcessLauncherTest, RefusesToStartWithAReason) {
        "Arguments of " + base + "/run.sh: expected a closing ' for the one at character 1: 'open"},
       {folder_ / "other", folder_ / "other/run.sh", "",
        (folder_ / "other/run.sh") + " does not lie in the model's folder " + base},
-      {base + "/run.sh/other", base + "/run.sh", "", "Unable to look at " + base + "/run.sh/other1: Not a directory"},
+      {base + "/run.sh/other", base + "/run.sh", "", "folder of the process folders (ProcessFolder): Not a directory"},
       {folder_ / "run_Process", base + "/run.sh", "", "which is made anew for every run"},
   };
   settings_.baseFolder = base;
