@@ -164,15 +164,17 @@ void takeWidthAsWritten(const SearchSpace& space, std::size_t j, int fieldWidth,
   }
 }
 
+/// `valuesOf(result)` returns the outputs of an evaluation.
+template <class ValuesOf>
 SensitivityTable tabulate(const PerturbationPlan& plan, std::span<const EvaluationResult> results,
-                          std::vector<double> EvaluationResult::*values) {
+                          const ValuesOf& valuesOf) {
   std::vector<std::vector<double>> outputs;
   for (const EvaluationResult& result : results) {
-    outputs.push_back(result.ok() ? result.*values : std::vector<double>{});
+    outputs.push_back(result.ok() ? valuesOf(result) : std::vector<double>{});
   }
   SensitivityTable table;
   const EvaluationResult& base = results.front();
-  table.base = base.ok() ? base.*values : std::vector<double>((base.*values).size(), kNaN);
+  table.base = base.ok() ? outputs.front() : std::vector<double>(valuesOf(base).size(), kNaN);
   table.derivatives = differenceColumns(plan, outputs);
   for (std::size_t j = 0; j < plan.differences.size(); ++j) {
     table.derivatives[j].resize(table.base.size(), kNaN);
@@ -336,13 +338,19 @@ bool hasRoomForStep(const SensitivitySettings& settings, const SearchSpace& spac
 }
 
 LocalSensitivity localSensitivity(const SensitivitySettings& settings, const SearchSpace& space, Evaluator& evaluator,
-                                  std::span<const int> fieldWidths, const Feasibility& feasibility) {
+                                  std::span<const int> fieldWidths, const Feasibility& feasibility,
+                                  std::span<const ObjectiveFunction> objectives) {
   LocalSensitivity sensitivity;
   sensitivity.plan = planPerturbations(settings, space, space.initial, fieldWidths, feasibility);
   sensitivity.results = evaluator.evaluateParameterSets(sensitivity.plan.sets, DispatchMode::task);
   noteFailures(sensitivity.plan, sensitivity.results);
-  sensitivity.measures = tabulate(sensitivity.plan, sensitivity.results, &EvaluationResult::measureValues);
-  sensitivity.objectives = tabulate(sensitivity.plan, sensitivity.results, &EvaluationResult::objectiveValues);
+  sensitivity.measures = tabulate(sensitivity.plan, sensitivity.results, [](const EvaluationResult& result) {
+    return result.exactMeasures.empty() ? result.measureValues : result.exactMeasures;
+  });
+  sensitivity.objectives = tabulate(sensitivity.plan, sensitivity.results, [&](const EvaluationResult& result) {
+    return result.exactMeasures.empty() ? result.objectiveValues
+                                        : objectiveFunctionValues(objectives, result.exactMeasures);
+  });
   const bool hasObjectives = !sensitivity.objectives.base.empty();
   sensitivity.ranking = ranked(hasObjectives ? sensitivity.objectives.composite : sensitivity.measures.composite);
   return sensitivity;

@@ -9,6 +9,7 @@
 #include "algorithms/analyses/uncertainty.h"
 #include "common/settings/keyword_row.h"
 #include "evaluation/evaluator.h"
+#include "measures/objective_functions.h"
 #include "parameters/feasibility.h"
 #include "parameters/search_space.h"
 
@@ -94,9 +95,11 @@ std::vector<std::size_t> ranked(std::span<const double> values);
 
 /// Evaluates all perturbed sets in one batch, the base set (the space's initial values) first. Where one of the two
 /// runs of a central difference failed, the other and the base set give a one-sided one; else a failed run leaves its
-/// parameter's derivatives out. The plan says so.
+/// parameter's derivatives out. The plan says so. Measures are those in 64 bits where the results have them, and so are
+/// the values of `objectives`, which may be left out otherwise.
 LocalSensitivity localSensitivity(const SensitivitySettings& settings, const SearchSpace& space, Evaluator& evaluator,
-                                  std::span<const int> fieldWidths = {}, const Feasibility& feasibility = {});
+                                  std::span<const int> fieldWidths = {}, const Feasibility& feasibility = {},
+                                  std::span<const ObjectiveFunction> objectives = {});
 
 /// The derivatives of any outputs by differences: p columns, one row per value; NaN for a parameter with a problem.
 /// `outputs[i]` are the values of set i; those of a failed set may be empty. A value that one side of a central
