@@ -286,6 +286,26 @@ TEST(LocalSensitivity, HasDerivativesOfMeasuresIn64BitsHoweverItIsRun) {
   EXPECT_EQ(folder.read("basin_Sensitivities.dat"), expected);
 }
 
+TEST(LocalSensitivity, LeavesOutAParameterOfAFewChoicesUnlessAskedFor) {
+  const ModelFolder folder;
+  const std::string setup = folder.writeSetup({.option = 1});
+  folder.editSetup("Upper_Bound = 5.0\n      Transformation_Type = 0",
+                   "Upper_Bound = 3.0\n      Transformation_Type = 2");
+  ASSERT_EQ(runProgram({setup}).exitCode, 0);
+  const std::string told =
+      "Warning: Parameter b has no derivatives: an integer of 4 values, it is a choice rather than a quantity; "
+      "Perturb_Choices = 1 in LOCAL_SA asks for its derivatives";
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr(told));
+  EXPECT_THAT(folder.read("basin_Sensitivity.dat"), HasSubstr("\n# " + told));
+  if (folder.exists("basin_Report.html")) {
+    EXPECT_THAT(folder.read("basin_Report.html"), HasSubstr(told.substr(told.find("Parameter"))));
+  }
+  EXPECT_EQ(readDataTable(folder.read("basin_Sensitivity.dat")).rows.size(), 3U);
+  folder.editSetup("[/LOCAL_SA]", "  Perturb_Choices = 1\n    [/LOCAL_SA]");
+  ASSERT_EQ(runProgram({setup}).exitCode, 0);
+  EXPECT_FALSE(std::isnan(cellOf(folder.read("basin_Sensitivities.dat"), {"b", "measure"}, "Derivative")));
+}
+
 TEST(LocalSensitivity, LeavesOutTheSecondOfTwoParametersThatActAsASumAtAnyStep) {
   for (const char* format : {"%.6f", "%.7g", "%.17g"}) {
     CertifiedProblem problem{nullptr, "", {{"3.1", 0}, {"2.7", 0}}};

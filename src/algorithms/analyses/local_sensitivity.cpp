@@ -60,6 +60,18 @@ Step wantedStep(const SensitivitySettings& settings, const SearchSpace& space, s
   return step;
 }
 
+/// Why a parameter of a few choices is left out; empty if it is none.
+std::string problemOfChoices(const SearchSpace& space, std::size_t j) {
+  if (space.transformation[j] != TransformationType::integer) return {};
+  constexpr double kRounding = 1.0e-8;
+  const double count = std::floor(space.upper[j] - space.lower[j] + kRounding);  // the upper bound is one above
+  if (count < 2.0 || count > kMostChoices) return {};
+  return fmt::format(
+      "an integer of {} values, it is a choice rather than a quantity; Perturb_Choices = 1 in LOCAL_SA asks for its "
+      "derivatives",
+      count);
+}
+
 /// Why the base set with this value of parameter j cannot be run; empty if it can.
 std::optional<std::string> violationAt(double value, std::size_t j, ParameterSet base, const Feasibility& feasibility) {
   if (!feasibility.isTested()) return std::nullopt;
@@ -301,7 +313,14 @@ const SettingSection<SensitivitySettings>& localSensitivitySection() {
         setting<&Settings::calculatesCovariance>(
             {.name = "Calculate_Covmatrix",
              .defaultValue = "0",
-             .meaning = "1: also compute the covariance and correlation matrix of the parameters."})}}};
+             .meaning = "1: also compute the covariance and correlation matrix of the parameters."}),
+        setting<&Settings::perturbsChoices>(
+            {.name = "Perturb_Choices",
+             .defaultValue = "0",
+             .meaning =
+                 fmt::format("1: integer parameters of 2 to {} values have derivatives, too. 0: they are choices "
+                             "and are left out.",
+                             kMostChoices)})}}};
   return section;
 }
 
@@ -312,6 +331,12 @@ PerturbationPlan planPerturbations(const SensitivitySettings& settings, const Se
   plan.sets.emplace_back(base.begin(), base.end());
   for (std::size_t j = 0; j < space.size(); ++j) {
     const Step step = wantedStep(settings, space, base, j);
+    if (std::string problem = settings.perturbsChoices ? "" : problemOfChoices(space, j); !problem.empty()) {
+      ParameterDifference& difference = plan.differences.emplace_back();
+      difference.extent = step.extent;
+      difference.problem = std::move(problem);
+      continue;
+    }
     const bool isCentral = settings.differencing == Differencing::central;
     plan.differences.push_back(planDifference(step, isCentral, j, feasibility, plan.sets));
     const int fieldWidth = j < fieldWidths.size() ? fieldWidths[j] : 0;
@@ -332,6 +357,7 @@ std::vector<int> ofVariableParameters(std::span<const int> fieldWidths, std::spa
 bool hasRoomForStep(const SensitivitySettings& settings, const SearchSpace& space, std::size_t j) {
   constexpr double kRounding = 1.0 + 1.0e-12;
   const Step step = wantedStep(settings, space, space.initial, j);
+  if (!settings.perturbsChoices && !problemOfChoices(space, j).empty()) return true;  // left out by name
   // Bounds that leave a single value leave no parameter to perturb; it is left out by name.
   if (step.roomUp + step.roomDown == 0.0) return true;
   return step.up <= step.roomUp * kRounding || step.down <= step.roomDown * kRounding;

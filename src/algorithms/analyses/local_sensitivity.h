@@ -26,7 +26,12 @@ struct SensitivitySettings {
   PerturbationOption perturbationOption = PerturbationOption::range;
   double perturbationFraction = 0.01;
   bool calculatesCovariance = false;
+  bool perturbsChoices = false;  ///< also integer parameters of kMostChoices values or fewer
 };
+/// Up to so many values of an integer parameter are choices rather than a quantity: a step from one to the next is a
+/// quarter of the range or more, and no derivative.
+inline constexpr int kMostChoices = 5;
+
 /// The section LOCAL_SA.
 const SettingSection<SensitivitySettings>& localSensitivitySection();
 
@@ -56,7 +61,7 @@ struct PerturbationPlan {
 /// Where a step would leave the bounds the difference is one-sided, inwards; where neither side has room the step is
 /// shortened. The width of a difference is that of the values that a model reads from a field of `fieldWidths`
 /// characters, one entry per parameter of the space (0 or no entry: any value as it is). A side that cannot be run is
-/// left out where the other one can.
+/// left out where the other one can. Of a parameter of a few choices there is no set unless the settings ask for it.
 PerturbationPlan planPerturbations(const SensitivitySettings& settings, const SearchSpace& space,
                                    std::span<const double> base, std::span<const int> fieldWidths = {},
                                    const Feasibility& feasibility = {});
