@@ -7,6 +7,7 @@
 
 #include "common/data_table.h"
 #include "integration/model_folder.h"
+#include "integration/mpi_job.h"
 #include "matchers.h"
 
 namespace mirevo::testing {
@@ -96,6 +97,24 @@ TEST(LocalSensitivity, KnowsTheRoundingOfValuesBetweenTheObservations) {
                                                   "be told from that of the parameters before it"));
 }
 
+/// A row of the list of parameters: `value` from 0 to 10,000.
+std::string parameterSection(std::size_t i, const std::string& value) {
+  return fmt::format(
+      "[PARAMETER_{0}]\nInitial_Value = {1}\nLower_Bound = 0\nUpper_Bound = 1E4\nTransformation_Type = 0\n"
+      "Parameter_Type = 0\nParameter_IDValue = {0}.5E-035\nParameter_Name = 'b{0}'\nParameter_Equation = ''\n"
+      "Comment = ''\n[Keywords]\n[/Keywords]\n[/PARAMETER_{0}]\n",
+      i, value);
+}
+
+/// Puts these sections in the place of the parameters of the setup.
+void useParameters(const ModelFolder& folder, std::size_t count, const std::string& sections) {
+  std::string text = folder.read("basin.kdx");
+  const auto from = text.find("TqSEKdxListItemCount", text.find("[MODEL_PARAMETERS]"));
+  text.replace(from, text.find("[INTERNAL_CONSTRAINTS]") - from,
+               fmt::format("TqSEKdxListItemCount = {}\n{}", count, sections));
+  folder.write("basin.kdx", text);
+}
+
 /// A regression problem with certified results.
 struct CertifiedProblem {
   const char* formula;                                    ///< of b[1], b[2], ... and x, for awk
@@ -108,7 +127,7 @@ std::vector<double> deviationsOf(const CertifiedProblem& problem, const std::str
   const ModelFolder folder;
   std::string observed = "time,y\n";
   std::string times;
-  std::string texts = fmt::format("TqSEKdxListItemCount = {}\n", problem.certified.size());
+  std::string texts;
   std::string lines = "!\n";
   std::istringstream data(problem.data);
   std::string x;
@@ -118,11 +137,7 @@ std::vector<double> deviationsOf(const CertifiedProblem& problem, const std::str
     times += fmt::format("2001-{:02}-{:02} {}\n", i / 28 + 1, i % 28 + 1, x);
   }
   for (std::size_t i = 1; i <= problem.certified.size(); ++i) {
-    texts += fmt::format(
-        "[PARAMETER_{0}]\nInitial_Value = {1}\nLower_Bound = 0\nUpper_Bound = 1E4\nTransformation_Type = 0\n"
-        "Parameter_Type = 0\nParameter_IDValue = {0}.5E-035\nParameter_Name = 'b{0}'\nParameter_Equation = ''\n"
-        "Comment = ''\n[Keywords]\n[/Keywords]\n[/PARAMETER_{0}]\n",
-        i, problem.certified[i - 1].first);
+    texts += parameterSection(i, problem.certified[i - 1].first);
     lines += fmt::format("!b{}               !\n", i);
   }
   folder.write("observed.csv", observed);
@@ -136,10 +151,7 @@ std::vector<double> deviationsOf(const CertifiedProblem& problem, const std::str
                   problem.formula),
       0755);
   const std::string setup = folder.writeSetup({.option = 1});
-  std::string text = folder.read("basin.kdx");
-  const auto from = text.find("TqSEKdxListItemCount", text.find("[MODEL_PARAMETERS]"));
-  text.replace(from, text.find("[INTERNAL_CONSTRAINTS]") - from, texts);
-  folder.write("basin.kdx", text);
+  useParameters(folder, problem.certified.size(), texts);
   folder.editSetup("Fraction = 0.005", "Fraction = " + fraction);
   const ProgramResult run = runProgram({setup});
   EXPECT_EQ(run.exitCode, 0) << run.error;
@@ -182,6 +194,116 @@ TEST(LocalSensitivity, ReproducesCertifiedStandardDeviations) {
       }
     }
   }
+}
+
+TEST(Correlation, OfMoreThanTenParametersIsATableOfItsOwnWithItsLargestEntriesInLogAndReport) {
+  constexpr std::size_t kCount = 11;
+  const ModelFolder folder;
+  std::string lines = "!\n";
+  std::string parameters;
+  std::string distributions = "    [/PARAMETER_2]\n";
+  for (std::size_t i = 1; i <= kCount; ++i) {
+    lines += fmt::format("!b{}               !\n", i);
+    parameters += parameterSection(i, "5");
+    if (i < 3) continue;
+    distributions += fmt::format("[PARAMETER_{0}]\nMean_Value = 5\nStandard_Deviation = 1\n[/PARAMETER_{0}]\n", i);
+  }
+  folder.write("model/parameters.tpl", lines);
+  folder.write("model/run.sh",
+               "#!/bin/sh\nawk '{ b[NR] = $1 } END { print \"time,y\"\n"
+               "  for (t = 1; t <= 28; ++t) { y = 0; for (i = 1; i <= NR; ++i) y += b[i] * cos(i * t)\n"
+               "    printf \"2001-01-%02d,%.17g\\n\", t, y } }' parameters.txt >simulated.csv\n",
+               0755);
+  const std::pair<int, const char*> cases[] = {{1, "basin_Correlation.dat"}, {3, "basin_SampleCorrelation.dat"}};
+  for (const auto& [option, file] : cases) {
+    const std::string setup = folder.writeSetup({.option = option});
+    useParameters(folder, kCount, parameters);
+    folder.editSetup("    [/PARAMETER_2]\n  [/UNCERTAINTY", distributions + "  [/UNCERTAINTY");
+    const ProgramResult run = runProgram({setup});
+    ASSERT_EQ(run.exitCode, 0) << run.error << folder.read("basin.log");
+    const std::string told = fmt::format("All correlations of the 11 parameters are in {}", file);
+    const std::string results = folder.read(RunSettings{.option = option}.resultFile());
+    EXPECT_EQ(occurrences(folder.read("basin.log"), told), 1);
+    EXPECT_EQ(occurrences(results, told), 1);
+    EXPECT_FALSE(std::isnan(cellOf(folder.read(file), {"b11"}, "b1")));
+    if (option != 1) continue;
+    EXPECT_THAT(results, HasSubstr("The covariance of the 11 parameters (search scale) is in basin_Covariance.dat"));
+    if (!folder.exists("basin_Report.html")) continue;  // in a build without its page
+    EXPECT_THAT(folder.read("basin_Report.html"),
+                ::testing::ContainsRegex("\"correlation\":\\[\\],\"largestCorrelations\":\\[\\{\"first\":\"b"));
+  }
+}
+
+// A step of 1e-7 changes a root mean square less than 32 bits can tell.
+TEST(LocalSensitivity, HasDerivativesOfMeasuresIn64BitsHoweverItIsRun) {
+  const ModelFolder folder;
+  std::string observed = "time,observed\n";
+  for (int day = 1; day <= 28; ++day) observed += fmt::format("2001-01-{:02},0\n", day);
+  folder.write("observed.csv", observed);
+  folder.write("model/run.sh",
+               "#!/bin/sh\nawk '/^[ab] =/ { b[++n] = $3 } END { print \"time,y\"\n"
+               "  for (t = 1; t <= 28; ++t) printf \"2001-01-%02d,%.17g\\n\", t, b[1] + b[2] * t }' "
+               "parameters.txt >simulated.csv\n",
+               0755);
+  double rms = 0.0;
+  double product = 0.0;
+  for (int t = 1; t <= 28; ++t) {
+    rms += (4.0 + t) * (4.0 + t) / 28.0;
+    product += (4.0 + t) / 28.0;
+  }
+  const double derivative = product / std::sqrt(rms);  // by a, which is 4; b is 1
+  std::string expected;
+  for (const bool isJob : {false, true}) {
+    for (const int slots : {1, 3}) {
+      if (isJob && (slots == 1 || !mpirunIsInstalled())) continue;
+      const std::string setup = folder.writeSetup({.option = 1, .slots = slots});
+      folder.editSetup("Fraction = 0.005", "Fraction = 1E-7");
+      folder.editSetup("Covmatrix = 1", "Covmatrix = 0");
+      const ProgramResult run = isJob ? startJob(3, {setup}).wait() : runProgram({setup});
+      ASSERT_EQ(run.exitCode, 0) << run.error;
+      const std::string found = folder.read("basin_Sensitivities.dat");
+      if (expected.empty()) expected = found;
+      EXPECT_EQ(found, expected) << isJob << " " << slots;
+    }
+  }
+  for (const char* kind : {"measure", "objective"}) {
+    EXPECT_NEAR(cellOf(expected, {"a", kind}, "Derivative"), derivative, 1e-7) << kind;
+  }
+  const std::string results = folder.read("basin_Sensitivity.dat");
+  const double inRows = (cellOf(results, {"3"}, "fit") - cellOf(results, {"2"}, "fit")) / 8e-7;
+  EXPECT_GT(std::abs(inRows - derivative), 0.1) << "else the test tells nothing";
+  const std::string report = folder.exists("basin_Report.html") ? folder.read("basin_Report.html") : "";
+  const std::string key = "\"derivatives\":[[";
+  if (const auto at = report.find(key); at != std::string::npos) {
+    EXPECT_NEAR(std::strtod(report.c_str() + at + key.size(), nullptr), derivative, 1e-6);
+  }
+
+  folder.editSetup("Restart = 0", "Restart = 1");
+  folder.write("basin_Sensitivity.dat", results.substr(0, results.find("\n3\t") + 1));
+  std::filesystem::remove(folder / "basin_Sensitivities.dat");
+  ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0);
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("Restart: 2 evaluations are taken from"));
+  EXPECT_EQ(folder.read("basin_Sensitivities.dat"), expected);
+}
+
+TEST(LocalSensitivity, LeavesOutAParameterOfAFewChoicesUnlessAskedFor) {
+  const ModelFolder folder;
+  const std::string setup = folder.writeSetup({.option = 1});
+  folder.editSetup("Upper_Bound = 5.0\n      Transformation_Type = 0",
+                   "Upper_Bound = 3.0\n      Transformation_Type = 2");
+  ASSERT_EQ(runProgram({setup}).exitCode, 0);
+  const std::string told =
+      "Warning: Parameter b has no derivatives: an integer of 4 values, it is a choice rather than a quantity; "
+      "Perturb_Choices = 1 in LOCAL_SA asks for its derivatives";
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr(told));
+  EXPECT_THAT(folder.read("basin_Sensitivity.dat"), HasSubstr("\n# " + told));
+  if (folder.exists("basin_Report.html")) {
+    EXPECT_THAT(folder.read("basin_Report.html"), HasSubstr(told.substr(told.find("Parameter"))));
+  }
+  EXPECT_EQ(readDataTable(folder.read("basin_Sensitivity.dat")).rows.size(), 3U);
+  folder.editSetup("[/LOCAL_SA]", "  Perturb_Choices = 1\n    [/LOCAL_SA]");
+  ASSERT_EQ(runProgram({setup}).exitCode, 0);
+  EXPECT_FALSE(std::isnan(cellOf(folder.read("basin_Sensitivities.dat"), {"b", "measure"}, "Derivative")));
 }
 
 TEST(LocalSensitivity, LeavesOutTheSecondOfTwoParametersThatActAsASumAtAnyStep) {

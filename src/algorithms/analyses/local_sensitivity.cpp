@@ -60,6 +60,18 @@ Step wantedStep(const SensitivitySettings& settings, const SearchSpace& space, s
   return step;
 }
 
+/// Why a parameter of a few choices is left out; empty if it is none.
+std::string problemOfChoices(const SearchSpace& space, std::size_t j) {
+  if (space.transformation[j] != TransformationType::integer) return {};
+  constexpr double kRounding = 1.0e-8;
+  const double count = std::floor(space.upper[j] - space.lower[j] + kRounding);  // the upper bound is one above
+  if (count < 2.0 || count > kMostChoices) return {};
+  return fmt::format(
+      "an integer of {} values, it is a choice rather than a quantity; Perturb_Choices = 1 in LOCAL_SA asks for its "
+      "derivatives",
+      count);
+}
+
 /// Why the base set with this value of parameter j cannot be run; empty if it can.
 std::optional<std::string> violationAt(double value, std::size_t j, ParameterSet base, const Feasibility& feasibility) {
   if (!feasibility.isTested()) return std::nullopt;
@@ -164,15 +176,17 @@ void takeWidthAsWritten(const SearchSpace& space, std::size_t j, int fieldWidth,
   }
 }
 
+/// `valuesOf(result)` returns the outputs of an evaluation.
+template <class ValuesOf>
 SensitivityTable tabulate(const PerturbationPlan& plan, std::span<const EvaluationResult> results,
-                          std::vector<double> EvaluationResult::*values) {
+                          const ValuesOf& valuesOf) {
   std::vector<std::vector<double>> outputs;
   for (const EvaluationResult& result : results) {
-    outputs.push_back(result.ok() ? result.*values : std::vector<double>{});
+    outputs.push_back(result.ok() ? valuesOf(result) : std::vector<double>{});
   }
   SensitivityTable table;
   const EvaluationResult& base = results.front();
-  table.base = base.ok() ? base.*values : std::vector<double>((base.*values).size(), kNaN);
+  table.base = base.ok() ? outputs.front() : std::vector<double>(valuesOf(base).size(), kNaN);
   table.derivatives = differenceColumns(plan, outputs);
   for (std::size_t j = 0; j < plan.differences.size(); ++j) {
     table.derivatives[j].resize(table.base.size(), kNaN);
@@ -299,7 +313,14 @@ const SettingSection<SensitivitySettings>& localSensitivitySection() {
         setting<&Settings::calculatesCovariance>(
             {.name = "Calculate_Covmatrix",
              .defaultValue = "0",
-             .meaning = "1: also compute the covariance and correlation matrix of the parameters."})}}};
+             .meaning = "1: also compute the covariance and correlation matrix of the parameters."}),
+        setting<&Settings::perturbsChoices>(
+            {.name = "Perturb_Choices",
+             .defaultValue = "0",
+             .meaning =
+                 fmt::format("1: integer parameters of 2 to {} values have derivatives, too. 0: they are choices "
+                             "and are left out.",
+                             kMostChoices)})}}};
   return section;
 }
 
@@ -310,6 +331,12 @@ PerturbationPlan planPerturbations(const SensitivitySettings& settings, const Se
   plan.sets.emplace_back(base.begin(), base.end());
   for (std::size_t j = 0; j < space.size(); ++j) {
     const Step step = wantedStep(settings, space, base, j);
+    if (std::string problem = settings.perturbsChoices ? "" : problemOfChoices(space, j); !problem.empty()) {
+      ParameterDifference& difference = plan.differences.emplace_back();
+      difference.extent = step.extent;
+      difference.problem = std::move(problem);
+      continue;
+    }
     const bool isCentral = settings.differencing == Differencing::central;
     plan.differences.push_back(planDifference(step, isCentral, j, feasibility, plan.sets));
     const int fieldWidth = j < fieldWidths.size() ? fieldWidths[j] : 0;
@@ -330,19 +357,26 @@ std::vector<int> ofVariableParameters(std::span<const int> fieldWidths, std::spa
 bool hasRoomForStep(const SensitivitySettings& settings, const SearchSpace& space, std::size_t j) {
   constexpr double kRounding = 1.0 + 1.0e-12;
   const Step step = wantedStep(settings, space, space.initial, j);
+  if (!settings.perturbsChoices && !problemOfChoices(space, j).empty()) return true;  // left out by name
   // Bounds that leave a single value leave no parameter to perturb; it is left out by name.
   if (step.roomUp + step.roomDown == 0.0) return true;
   return step.up <= step.roomUp * kRounding || step.down <= step.roomDown * kRounding;
 }
 
 LocalSensitivity localSensitivity(const SensitivitySettings& settings, const SearchSpace& space, Evaluator& evaluator,
-                                  std::span<const int> fieldWidths, const Feasibility& feasibility) {
+                                  std::span<const int> fieldWidths, const Feasibility& feasibility,
+                                  std::span<const ObjectiveFunction> objectives) {
   LocalSensitivity sensitivity;
   sensitivity.plan = planPerturbations(settings, space, space.initial, fieldWidths, feasibility);
   sensitivity.results = evaluator.evaluateParameterSets(sensitivity.plan.sets, DispatchMode::task);
   noteFailures(sensitivity.plan, sensitivity.results);
-  sensitivity.measures = tabulate(sensitivity.plan, sensitivity.results, &EvaluationResult::measureValues);
-  sensitivity.objectives = tabulate(sensitivity.plan, sensitivity.results, &EvaluationResult::objectiveValues);
+  sensitivity.measures = tabulate(sensitivity.plan, sensitivity.results, [](const EvaluationResult& result) {
+    return result.exactMeasures.empty() ? result.measureValues : result.exactMeasures;
+  });
+  sensitivity.objectives = tabulate(sensitivity.plan, sensitivity.results, [&](const EvaluationResult& result) {
+    return result.exactMeasures.empty() ? result.objectiveValues
+                                        : objectiveFunctionValues(objectives, result.exactMeasures);
+  });
   const bool hasObjectives = !sensitivity.objectives.base.empty();
   sensitivity.ranking = ranked(hasObjectives ? sensitivity.objectives.composite : sensitivity.measures.composite);
   return sensitivity;

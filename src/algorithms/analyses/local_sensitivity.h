@@ -9,6 +9,7 @@
 #include "algorithms/analyses/uncertainty.h"
 #include "common/settings/keyword_row.h"
 #include "evaluation/evaluator.h"
+#include "measures/objective_functions.h"
 #include "parameters/feasibility.h"
 #include "parameters/search_space.h"
 
@@ -25,7 +26,12 @@ struct SensitivitySettings {
   PerturbationOption perturbationOption = PerturbationOption::range;
   double perturbationFraction = 0.01;
   bool calculatesCovariance = false;
+  bool perturbsChoices = false;  ///< also integer parameters of kMostChoices values or fewer
 };
+/// Up to so many values of an integer parameter are choices rather than a quantity: a step from one to the next is a
+/// quarter of the range or more, and no derivative.
+inline constexpr int kMostChoices = 5;
+
 /// The section LOCAL_SA.
 const SettingSection<SensitivitySettings>& localSensitivitySection();
 
@@ -55,7 +61,7 @@ struct PerturbationPlan {
 /// Where a step would leave the bounds the difference is one-sided, inwards; where neither side has room the step is
 /// shortened. The width of a difference is that of the values that a model reads from a field of `fieldWidths`
 /// characters, one entry per parameter of the space (0 or no entry: any value as it is). A side that cannot be run is
-/// left out where the other one can.
+/// left out where the other one can. Of a parameter of a few choices there is no set unless the settings ask for it.
 PerturbationPlan planPerturbations(const SensitivitySettings& settings, const SearchSpace& space,
                                    std::span<const double> base, std::span<const int> fieldWidths = {},
                                    const Feasibility& feasibility = {});
@@ -94,9 +100,11 @@ std::vector<std::size_t> ranked(std::span<const double> values);
 
 /// Evaluates all perturbed sets in one batch, the base set (the space's initial values) first. Where one of the two
 /// runs of a central difference failed, the other and the base set give a one-sided one; else a failed run leaves its
-/// parameter's derivatives out. The plan says so.
+/// parameter's derivatives out. The plan says so. Measures are those in 64 bits where the results have them, and so are
+/// the values of `objectives`, which may be left out otherwise.
 LocalSensitivity localSensitivity(const SensitivitySettings& settings, const SearchSpace& space, Evaluator& evaluator,
-                                  std::span<const int> fieldWidths = {}, const Feasibility& feasibility = {});
+                                  std::span<const int> fieldWidths = {}, const Feasibility& feasibility = {},
+                                  std::span<const ObjectiveFunction> objectives = {});
 
 /// The derivatives of any outputs by differences: p columns, one row per value; NaN for a parameter with a problem.
 /// `outputs[i]` are the values of set i; those of a failed set may be empty. A value that one side of a central

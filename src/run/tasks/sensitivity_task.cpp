@@ -138,7 +138,9 @@ void addCovariance(const TaskContext& context, const ParameterSet& set, const Li
     return;
   }
   const ParameterCovariance covariance = parameterCovariance(*found.model);
-  for (std::string& line : formatCovariance(covariance, context.space, set)) outcome.report.push_back(std::move(line));
+  for (std::string& line : formatCovariance(covariance, context.space, set, context.filePrefix)) {
+    outcome.report.push_back(std::move(line));
+  }
   for (DataTable& table : covarianceTables(covariance, context.space, set)) outcome.tables.push_back(std::move(table));
   outcome.tables.push_back(jacobianTable(*found.model, context.space, found.labels));
 }
@@ -175,7 +177,8 @@ int SensitivityTask::plannedEvaluations(std::size_t variableCount) const {
 TaskOutcome SensitivityTask::outcomeOf(const TaskContext& context, Evaluator& evaluator) const {
   TaskOutcome outcome{std::string(kEndOfTask)};
   const std::vector<int> fieldWidths = ofVariableParameters(context.fieldWidths, context.parameters);
-  LocalSensitivity sensitivity = localSensitivity(settings, context.space, evaluator, fieldWidths, context.feasibility);
+  LocalSensitivity sensitivity =
+      localSensitivity(settings, context.space, evaluator, fieldWidths, context.feasibility, context.objectives);
   Linearised found;
   if (settings.calculatesCovariance) found = linearised(context, sensitivity);
   if (found.model) takeObservations(*found.model, sensitivity);
