@@ -124,6 +124,7 @@ std::size_t editDistance(std::string_view a, std::string_view b) {
 }
 
 std::optional<std::string> nearestName(std::string_view name, std::span<const std::string> candidates) {
+  if (name.empty()) return std::nullopt;  // it is one edit from every name of one character
   const std::size_t limit = std::max<std::size_t>(1, name.size() / 3);
   std::optional<std::string> nearest;
   std::size_t nearestDistance = limit + 1;

@@ -89,6 +89,7 @@ void mirevoMain(const CommandLine& commandLine) {
   if (setupFileName.empty()) {
     if (!answers) stopRun(0);  // a launcher that sees this process fail would end the one that answers
     showMessage(kUsage);
+    for (const std::string& sentence : commandLine.ignored()) showMessage(sentence, {}, MessageType::warning);
     stopRun(1);
   }
   if (isQuestion(setupFileName)) {

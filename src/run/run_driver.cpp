@@ -2,6 +2,8 @@
 
 #include <algorithm>
 #include <array>
+#include <cerrno>
+#include <cstring>
 #include <filesystem>
 #include <new>
 #include <unistd.h>
@@ -115,6 +117,9 @@ void RunDriver::openRun(const std::string& setupFileName) {
   const SetupLocation setup = locateSetup(setupFileName);
   filePrefix_ = setup.folder + "/" + setup.name;
   std::error_code ignored;
+  if (const std::string fault = faultOfFile(setup.folder); fault == std::strerror(ENOENT)) {
+    fatalError("Error: Unable to open " + setup.file, fmt::format("there is no folder {}", setup.folder));
+  }
   if (const std::string fault = faultOfFile(setup.file);
       !fault.empty() && std::filesystem::exists(setup.file, ignored)) {
     fatalError("Error: Unable to open " + setup.file, fault);  // before files are created beside it: it may be in /dev

@@ -105,10 +105,17 @@ std::string printable(std::string_view line) {
   return std::string(trimTrailing(text));
 }
 
-/// What a shell tells with its own codes (POSIX.1-2017, 2.8.2).
-std::string_view meaningOfCode(int status) {
-  if (status == 127) return " (a shell: command not found)";
-  return status == 126 ? " (a shell: command not executable)" : "";
+/// What a shell tells with its own codes (POSIX.1-2017, 2.8.2) about the batch file.
+std::string meaningOfCode(int status, const std::string& file) {
+  if (status != 126 && status != 127) return {};
+  std::string text = status == 127 ? " (a shell: command not found" : " (a shell: command not executable";
+  std::string ignored;
+  const std::string head = readFileHead(file, ignored).value_or("");
+  if (head.find("\r\n") != std::string::npos) {
+    text +=
+        "; the lines of the file end in CR LF, of which a shell takes CR for part of a word: save it with LF line ends";
+  }
+  return text + ")";
 }
 
 }  // namespace
@@ -322,8 +329,9 @@ void PosixProcessLauncher::finishItem(Slot& slot, int code, int status) {
                     fmt::format("{} was ended by signal {}{}", name, status,
                                 description == nullptr ? "" : fmt::format(" ({})", description))};
   } else if (status != 0) {
-    slot.failure = {BatchFailure::Kind::exitCode, status,
-                    fmt::format("{} exited with code {}{}", name, status, meaningOfCode(status))};
+    slot.failure = {
+        BatchFailure::Kind::exitCode, status,
+        fmt::format("{} exited with code {}{}", name, status, meaningOfCode(status, slot.commands[slot.item].file()))};
   } else if (slot.item + 1 < slot.commands.size()) {
     ++slot.item;
     startItem(slot);

@@ -63,8 +63,8 @@ class EntryCheck final {
   }
 
   void warnRepeated(KdxPosition position, std::string_view kind, const std::string& name, KdxPosition first) {
-    report(position, fmt::format("{} {} stands at line {} already, this one is not read", kind, quotedForMessage(name),
-                                 first.line));
+    report(position,
+           fmt::format("{} {} is at line {} already, this one is not read", kind, quotedForMessage(name), first.line));
   }
 
   void report(KdxPosition position, const std::string& text) {

@@ -72,6 +72,10 @@ TEST_F(PosixProcessLauncherTest, EndsAreToldApart) {
       {"#!/bin/sh\nexit 0\n", 0755, Kind::none, 0, ""},
       {"echo no first line with an interpreter\n", 0755, Kind::none, 0, ""},
       {"nonesuch\n", 0755, Kind::exitCode, 127, "exited with code 127 (a shell: command not found)"},
+      {"nonesuch\r\n", 0755, Kind::exitCode, 127,
+       "exited with code 127 (a shell: command not found; the lines of the file end in CR LF, of which a shell takes "
+       "CR "
+       "for part of a word: save it with LF line ends)"},
       {"echo no run bit; exit 4\n", 0644, Kind::exitCode, 4, "exited with code 4"},
       {"#!/bin/sh\nkill -SEGV $$\n", 0755, Kind::signal, SIGSEGV, "was ended by signal 11 (Segmentation fault)"},
       {"", 0, Kind::couldNotStart, ENOENT, "could not be started: No such file or directory"},

@@ -172,11 +172,11 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatAreSeldomMeant)
       {"Weight_Above = 2.5 => Weigth_Abov = 2.5",
        "setup.kdx:68:9: keyword \"Weigth_Abov\" is unknown and not read, did you mean \"Weight_Above\"?"},
       {"Min_Change = 0.005 => Min_Change = 0.005\nMin_Change = 1.0",
-       "setup.kdx:149:1: keyword \"Min_Change\" stands at line 148 already, this one is not read"},
+       "setup.kdx:149:1: keyword \"Min_Change\" is at line 148 already, this one is not read"},
       {"[SCENARIOS] => [Scenario][/Scenario][SCENARIOS]",
        "setup.kdx:103:3: section \"Scenario\" is unknown and not read, did you mean \"SCENARIOS\"?"},
       {"TqSEKdxListItemCount = 3 => 2",
-       "setup.kdx:20:28: TqSEKdxListItemCount: there are 3 sections PARAMETER_n here, those beyond 2 are not read: "
+       "setup.kdx:20:28: TqSEKdxListItemCount: 3 sections PARAMETER_n are here, those beyond 2 are not read: "
        "PARAMETER_3\n"},
       {"Function_Name = 'Flow' => ''",
        "setup.kdx:91:16: Name: no output measure has this Function_Name, the objective function is always 0"},
