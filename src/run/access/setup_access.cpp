@@ -7,6 +7,7 @@
 
 #include <fmt/core.h>
 
+#include "common/encoding.h"
 #include "common/fatal_error.h"
 #include "common/text.h"
 #include "run/access/setup_value.h"
@@ -86,9 +87,11 @@ std::string wantedInstead(const KdxUnquotedText& found, const SetupSchema& schem
 KdxDocument parsed(const std::string& fileName, std::string_view text, const SetupSchema& schema) {
   auto result = parseKdx(fileName, text);
   if (const auto* error = std::get_if<KdxSyntaxError>(&result)) {
-    fatalError("Error: Unable to open " + fileName,
-               fmt::format("{}:{}:{}: {}{}", fileName, error->position.line, error->position.column, error->message,
-                           error->unquoted ? wantedInstead(*error->unquoted, schema) : ""));
+    const std::string fault = faultOfEncoding(text);
+    fatalError(
+        "Error: Unable to open " + fileName,
+        fmt::format("{}:{}:{}: {}{}{}{}", fileName, error->position.line, error->position.column, error->message,
+                    error->unquoted ? wantedInstead(*error->unquoted, schema) : "", fault.empty() ? "" : "; ", fault));
   }
   return std::get<KdxDocument>(std::move(result));
 }
