@@ -12,6 +12,7 @@
 #include "common/descriptor.h"
 #include "common/descriptor_output.h"
 #include "common/file_copy.h"
+#include "common/utf8.h"
 
 namespace mirevo {
 
@@ -85,7 +86,8 @@ void RunLog::write(std::string_view record) {
     return;
   }
   putBackIfRemoved(descriptor_, path_);  // if that fails, the log and the run go on all the same
-  const int error = writeWhole(descriptor_, record).error;
+  // What a model prints and what files are called may be in any encoding.
+  const int error = writeWhole(descriptor_, withValidUtf8(record)).error;
   if (error != 0 && writeError_.empty()) writeError_ = std::strerror(error);
 }
 

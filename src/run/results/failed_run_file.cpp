@@ -38,7 +38,7 @@ FailedRunFile::FailedRunFile(FailedRunPaths paths, std::string setupName, std::v
       tableHead_(std::move(tableHead)) {}
 
 std::string FailedRunFile::headLine() const {
-  return fmt::format("# Failed evaluations of {}\n", setupName_);
+  return fmt::format("# Failed evaluations of {}\n", withValidUtf8(setupName_));
 }
 
 FailedRunFile::Earlier FailedRunFile::readEarlier(const std::set<int>& numbers) const {

@@ -11,6 +11,7 @@
 #include "common/calendar.h"
 #include "common/data_table.h"
 #include "common/text.h"
+#include "common/utf8.h"
 #include "run/results/result_row.h"
 
 namespace mirevo {
@@ -160,7 +161,7 @@ std::vector<std::string> seriesNames(std::span<const OutputMeasure> measures, st
 
 std::string seriesTableText(const SeriesTable& table) {
   std::string text;
-  for (const std::string& line : table.headLines) text += fmt::format("# {}\n", line);
+  for (const std::string& line : table.headLines) text += fmt::format("# {}\n", withValidUtf8(line));
   if (table.initial) {
     text += head::line(head::kInitial, *table.initial, table.isOfInitialParameters ? head::kOfSetup : head::kOfFirst);
   }

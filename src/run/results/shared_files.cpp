@@ -10,6 +10,7 @@
 #include "common/files.h"
 #include "common/take_text.h"
 #include "common/text.h"
+#include "common/utf8.h"
 #include "run/results/record_file.h"
 
 namespace mirevo {
@@ -90,7 +91,7 @@ std::string keepEarlierResults(const std::string& path, const std::string& setup
   if (!head) {
     log.warning(
         fmt::format("{}, kept from an earlier run: {}. Whether it is of this setup is not known", kept, reason));
-  } else if (!earlier.empty() && fileNameOf(earlier) != fileNameOf(setupFile)) {
+  } else if (!earlier.empty() && fileNameOf(earlier) != withValidUtf8(fileNameOf(setupFile))) {
     log.warning(fmt::format(
         "{} held results of another setup, {}, which shares this name with {}. They were kept as {}. Give one of the "
         "setups another name",
