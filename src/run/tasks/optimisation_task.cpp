@@ -153,10 +153,16 @@ void OptimisationTask::readStopping(const SetupSection& section) {
   }
   section.check(bound);
   warnOfOneLoop(section);
-  const std::int64_t sampleSize = method->populationSize();
-  if (sampleSize <= stopping.maxEvaluations) return;
-  section.warn(kBudgetKeyword, fmt::format("the initial sample of {} sets is cut to {}, and no search follows",
-                                           sampleSize, stopping.maxEvaluations));
+  const std::int64_t sampleSize = method->sampleSize(initialSample, stopping.maxEvaluations);
+  if (sampleSize > stopping.maxEvaluations) {
+    section.warn(kBudgetKeyword, fmt::format("the initial sample of {} sets is cut to {}, and no search follows",
+                                             sampleSize, stopping.maxEvaluations));
+  } else if (sampleSize == stopping.maxEvaluations && method->populationSize() == 0) {
+    // A population that just fits may be meant as a sample.
+    section.warn(kBudgetKeyword, fmt::format("{} used up by the start of the search, and no search follows",
+                                             sampleSize == 1 ? "the only evaluation is"
+                                                             : fmt::format("the {} evaluations are", sampleSize)));
+  }
 }
 
 void OptimisationTask::readSurrogate(const TaskReading& reading, const SetupSection& section,

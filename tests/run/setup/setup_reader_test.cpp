@@ -295,3 +295,6 @@ TEST_F(SetupReaderTest, TheSetupIsLookedForWhereItsNameSays) {
 
 }  // namespace
 }  // namespace mirevo
+      {"Algorithm_Type = 1 => 2 & Use_Surrogate_Model = 1 => 0 & NoSimultaneousSim = 4 => 1 & "
+       "Max_No_Evaluations = 500 => 1",
+       "Max_No_Evaluations: the only evaluation is used up by the start of the search, and no search follows"},
