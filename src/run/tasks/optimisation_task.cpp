@@ -101,6 +101,18 @@ std::vector<const SectionRow*> OptimisationTask::sections() const {
   return rows;
 }
 
+std::vector<std::string> OptimisationTask::neededSections(const SetupSection& target) const {
+  std::vector<std::string> paths{std::string(optimisationSection().row.path)};
+  const auto algorithm = target.peek(paths.front(), kAlgorithmKeyword);
+  const auto chosen = algorithm ? searchMethods().make(*algorithm) : nullptr;
+  if (chosen) paths.emplace_back(chosen->section().row->path);
+  paths.emplace_back(initialSampleSection().row.path);
+  paths.emplace_back(stoppingSection().row.path);
+  const bool hasSurrogate = target.peek(paths.front(), kSurrogateKeyword) == SetupValue(std::int32_t{1});
+  if (hasSurrogate) paths.emplace_back(surrogateSection().row.path);
+  return paths;
+}
+
 void OptimisationTask::read(const TaskReading& reading) {
   const SetupSection section = reading.target.open("OPTIMISATION_ALGORITHM");
   section.read(optimisationSection(), *this);
