@@ -71,6 +71,7 @@ int RunDriver::run(const std::string& setupFileName) {
     openRun(setupFileName);
     const std::string setupText = readSetupText(setupFileName);
     config_ = readSetup(setupFileName, setupText, state_.log, state_.job->hasWorkers());
+    isSetupRead_ = true;
     buildModel();
     logSetup();
     openResults();
@@ -121,7 +122,7 @@ void RunDriver::openRun(const std::string& setupFileName) {
   }
   const std::string logFile = runFilePath(filePrefix_, run_files::kLog);
   requireReplaceable(logFile, run_files::kLog);
-  const std::string keptLog = RunLog::isOfRefusedSetup(logFile) ? std::string() : keepEarlierFile(logFile);
+  const std::string keptLog = RunLog::isOfNoRun(logFile) ? std::string() : keepEarlierFile(logFile);
   std::string reason;
   if (!state_.log.open(logFile, reason)) fatalError("Error: Unable to open " + logFile, reason);
   signalState.runLogDescriptor = state_.log.descriptor();
@@ -222,7 +223,7 @@ void RunDriver::logSetup() {
 }
 
 void RunDriver::openResults() {
-  isAccepted_ = true;
+  hasBegun_ = true;
   state_.objectiveValues.resize(config_.objectives.size());
   results_->open(config_, runner_->observedSeries(), *aggregator_, state_.log);
   putEarlierReportAside();
@@ -531,7 +532,7 @@ void RunDriver::endLogInError(std::string_view message, std::string_view details
   const EndingSignalsHeld held;  // or a signal's message could come below
   if (reporter_) logFailures();
   if (!details.empty()) state_.log.line(fmt::format("\n{}", details));
-  if (!isAccepted_) state_.log.markRefused();
+  if (!hasBegun_) state_.log.markAsOfNoRun(isSetupRead_ ? "The run did not begin" : "The setup is refused");
   state_.log.line(fmt::format("\n{}", message));
   signalState.runLogDescriptor = -1;
   state_.log.close();

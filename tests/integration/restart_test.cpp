@@ -79,8 +79,10 @@ TEST_F(Restart, AFinishedRunIsWalkedThroughAndEndsWithTheSameFile) {
   const std::string expected = results();
   folder_.write("model/run.sh", folder_.read("model/run.sh") + "\n");  // the same model, but not the same text
   run(1);
-  EXPECT_THAT(log(), AllOf(HasSubstr("the content of model/run.sh has changed"),
-                           EndsWith("\n\nError: Unable to continue the earlier run\n")));
+  EXPECT_THAT(log(),
+              AllOf(HasSubstr("the content of model/run.sh has changed"),
+                    HasSubstr("\nThe run did not begin: no model was run, and the next start replaces this log\n"),
+                    EndsWith("\n\nError: Unable to continue the earlier run\n")));
   EXPECT_EQ(results(), expected) << "refused without a change";
   folder_.useScript("");
   run();
