@@ -280,10 +280,16 @@ void RunDriver::openSeries() {
       state_.log.warning(fmt::format("The series of the earlier run are not taken up: {}: {}", path, reason));
     }
     const SeriesTable table = readSeriesTable(earlier.value_or(std::string{}));
-    if (table.isOf(task) && !table.isCutOff()) {
+    if (table.isOf(task)) {
+      if (table.isCutOff()) {
+        state_.log.warning(fmt::format(
+            "{} is cut off or damaged: only {} of its {} rows are taken up, and the series of the earlier run "
+            "have no values at other times",
+            path, table.rowCount(), *table.rowsWritten));
+      }
       series_->resume(table);
     } else {
-      keepEarlierFile(path, state_.log);  // damaged, or of a run of another task in between
+      keepEarlierFile(path, state_.log);  // of a run of another task in between
     }
   }
   reporter_->recordSeries(*series_);
