@@ -61,13 +61,24 @@ void appendColumns(std::vector<std::vector<double>>& rows, const std::vector<std
   for (std::size_t i = 0; i < more.size(); ++i) rows[i].insert(rows[i].end(), more[i].begin(), more[i].end());
 }
 
-std::optional<ReportedBand> readBand(const std::string& path) {
+/// Empty where there is none; `fault` tells of a file that is damaged. `lines`: how many were written, if that is
+/// known.
+std::optional<ReportedBand> readBand(const std::string& path, std::optional<int> lines, std::string& fault) {
   constexpr int kItems = 4;
   std::string reason;
   const auto file = createTimeSeriesObject(path, reason);
-  if (!file || !file->open(path) || file->itemCount() != kItems || !file->startTime()) return std::nullopt;
-  for (int item = 1; item <= kItems; ++item) {
-    if (!file->getData(item)) return std::nullopt;
+  std::error_code ignored;
+  if (!std::filesystem::exists(path, ignored)) return std::nullopt;
+  const std::string text = readTextFile(path, reason).value_or(std::string());
+  bool isRead = file && file->open(path) && file->itemCount() == kItems && file->startTime();
+  for (int item = 1; isRead && item <= kItems; ++item) isRead = file->getData(item);
+  const auto wholeLines = std::count(text.begin(), text.end(), '\n');
+  if (!isRead) {
+    fault = fileNameOf(path) + " is damaged and left out";
+    return std::nullopt;
+  }
+  if (lines && wholeLines != *lines) {
+    fault = fmt::format("{} is cut off or damaged: {} of its {} lines are whole", fileNameOf(path), wholeLines, *lines);
   }
   ReportedBand band;
   const std::int64_t origin = secondNumber(*file->startTime());
@@ -117,10 +128,14 @@ std::string pairName(std::span<const OutputMeasure> measures, std::size_t measur
   return name;
 }
 
-std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::string& filePrefix) {
+std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::string& filePrefix, const RunRecord& record,
+                                        std::vector<std::string>& faults) {
   std::vector<ReportedBand> bands;
   for (const std::size_t i : measuresOfDistinctPairs(config.measures)) {
-    auto band = readBand(runFilePath(filePrefix, run_files::kBand, static_cast<int>(i) + 1));
+    const std::string path = runFilePath(filePrefix, run_files::kBand, static_cast<int>(i) + 1);
+    std::string fault;
+    auto band = readBand(path, record.linesOf(fileNameOf(path)), fault);
+    if (!fault.empty()) faults.push_back(fault);
     if (!band) continue;
     band->measure = pairName(config.measures, i);
     bands.push_back(std::move(*band));

@@ -61,6 +61,7 @@ class RunDriver final {
   void openSeries();
   /// Runs the task, if there is one, and writes its files.
   TaskOutcome runTask();
+  void writeFiles(std::span<const TaskFile> files);
   TaskContext taskContext();
   /// At an early end: logs and writes the statistics of what succeeded, and returns their lines for the result file.
   /// Nothing that goes wrong here may hide why the run ended.
@@ -86,11 +87,12 @@ class RunDriver final {
   std::vector<std::string> closingLines(const Ending& ending) const;
 
   RunState state_;
-  FileLock runLock_;         ///< on the files with the setup's name
-  FileLock processLock_;     ///< the master's, on the process folders of the job
-  bool isAccepted_ = false;  ///< the setup: from now on files of earlier runs are touched
-  std::string filePrefix_;   ///< folder and name of the setup, without ".kdx": the beginning of the paths of the run's
-                             ///< files
+  FileLock runLock_;      ///< on the files with the setup's name
+  FileLock processLock_;  ///< the master's, on the process folders of the job
+  bool isSetupRead_ = false;
+  bool hasBegun_ = false;   ///< from now on files of earlier runs are touched
+  std::string filePrefix_;  ///< folder and name of the setup, without ".kdx": the beginning of the paths of the run's
+                            ///< files
   RunConfig config_;
   std::unique_ptr<ParameterModel> parameters_;
   std::unique_ptr<ObjectiveAggregator> aggregator_;

@@ -48,7 +48,7 @@ class RunResults final {
 
   /// Writes what the task found, each table to its own file; an earlier one with other content is kept under a numbered
   /// name. Throws FatalError.
-  void writeTables(std::span<const DataTable> tables) const;
+  void writeTables(std::span<const DataTable> tables, RunLog& log) const;
 
   ResultFile& table() { return table_; }
   FailedRunFile& failedRuns() { return failedRuns_; }
@@ -66,6 +66,7 @@ class RunResults final {
   /// Account, tables of failures and pairs, those of analyses.
   std::vector<std::string> pathsBesideResults() const;
   std::vector<std::string> bandPaths(const RunConfig& config) const;
+  std::vector<std::string> earlierBands() const;
   /// Those of an unfinished run do not count any more when it goes on, and can be computed again.
   void removeStatistics(const RunConfig& config) const;
   void goOn(const RunConfig& config, const ObjectiveAggregator& aggregator, RunLog& log);

@@ -11,6 +11,7 @@
 #include "common/files.h"
 #include "common/take_text.h"
 #include "common/text.h"
+#include "common/utf8.h"
 #include "run/results/record_file.h"
 
 namespace mirevo {
@@ -68,26 +69,34 @@ std::string setupNamedIn(std::string_view head) {
 }
 
 bool isSameSetup(std::string_view one, std::string_view other) {
-  return withoutEnding(fileNameOf(one)) == withoutEnding(fileNameOf(other));
+  return withValidUtf8(withoutEnding(fileNameOf(one))) == withValidUtf8(withoutEnding(fileNameOf(other)));
 }
 
-std::vector<std::string> keepEarlierResults(std::span<const std::string> paths, const std::string& setupFile,
-                                            RunLog& log) {
-  std::vector<std::string> kept;
+void logKept(const std::string& path, const std::string& kept, RunLog& log) {
+  if (!kept.empty()) log.line(fmt::format("{} of an earlier run was kept as {}", fileNameOf(path), kept));
+}
+
+std::string keepEarlierFile(const std::string& path, RunLog& log) {
+  std::string kept = keepEarlierFile(path);
+  logKept(path, kept, log);
+  return kept;
+}
+
+void keepEarlierResults(std::span<const std::string> paths, const std::string& setupFile, RunLog& log) {
   std::vector<std::string> ofAnother;
   std::string another;
   for (const std::string& path : paths) {
-    kept.push_back(keepEarlierFile(path));
-    if (kept.back().empty()) continue;
+    const std::string kept = keepEarlierFile(path, log);
+    if (kept.empty()) continue;
     std::string reason;
-    const auto head = readFileHead(kept.back(), reason);
+    const auto head = readFileHead(kept, reason);
     const std::string earlier = head ? setupNamedIn(*head) : std::string();
     if (!head) {
-      log.warning(fmt::format("{}, kept from an earlier run: {}. Whether it is of this setup is not known", kept.back(),
-                              reason));
+      log.warning(
+          fmt::format("{}, kept from an earlier run: {}. Whether it is of this setup is not known", kept, reason));
     } else if (!earlier.empty() && !isSameSetup(earlier, setupFile)) {
       another = earlier;
-      ofAnother.push_back(kept.back());
+      ofAnother.push_back(kept);
     }
   }
   if (!ofAnother.empty()) {
@@ -96,9 +105,7 @@ std::vector<std::string> keepEarlierResults(std::span<const std::string> paths, 
                     "of the setups another name",
                     another, fmt::join(ofAnother, ", ")));
   }
-  return kept;
 }
-
 void keepResultsOfAnother(const std::string& results, std::span<const std::string> paths, const std::string& setupFile,
                           RunLog& log) {
   const auto setupOf = [](const std::string& path) {
@@ -112,6 +119,16 @@ void keepResultsOfAnother(const std::string& results, std::span<const std::strin
     return !own.empty() && !setup.empty() && !isSameSetup(setup, own);
   });
   keepEarlierResults(ofAnother, setupFile, log);
+}
+
+void writeBesideResults(const std::string& path, const std::string& text, RunLog& log) {
+  std::string reason;
+  if (readTextFile(path, reason) == text) return;
+  keepEarlierFile(path, log);
+  RecordFile file;
+  file.open(path);
+  file.append(text);
+  file.close();
 }
 
 }  // namespace mirevo

@@ -23,14 +23,22 @@ std::string setupNamedIn(std::string_view head);
 /// Whether two paths are those of one setup, but for the folder and however the ending is spelt.
 bool isSameSetup(std::string_view one, std::string_view other);
 
-/// keepEarlierFile() for each of the results, and the names under which they are kept, empty ones included. With a
-/// warning if the heads of some name another setup, whose results then have moved.
-std::vector<std::string> keepEarlierResults(std::span<const std::string> paths, const std::string& setupFile,
-                                            RunLog& log);
+/// Says in the log that `path` of an earlier run was kept as `kept`, unless that is empty.
+void logKept(const std::string& path, const std::string& kept, RunLog& log);
+/// keepEarlierFile() with logKept().
+std::string keepEarlierFile(const std::string& path, RunLog& log);
+
+/// The same for each of the results, with a warning if the heads of some name another setup, whose results then have
+/// moved.
+void keepEarlierResults(std::span<const std::string> paths, const std::string& setupFile, RunLog& log);
 
 /// The same for those of `paths` whose heads name another setup than that of `results`: a run that goes on would
 /// replace them by its own.
 void keepResultsOfAnother(const std::string& results, std::span<const std::string> paths, const std::string& setupFile,
                           RunLog& log);
+
+/// Writes a text to a file beside the results, as a whole. An existing file with the same content is left as it is; one
+/// with other content is kept under a numbered name. Throws FatalError.
+void writeBesideResults(const std::string& path, const std::string& text, RunLog& log);
 
 }  // namespace mirevo

@@ -1,5 +1,7 @@
 #include "run/results/shared_files.h"
 
+#include <tuple>
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -29,14 +31,17 @@ TEST(SharedFiles, AreThoseOfSetupsNamedAfterAResultOfAnother) {
 
 TEST(SharedFiles, KeptResultsOfAnotherSetupAreToldOfOnce) {
   const TemporaryFolder folder;
-  for (const auto& [setup, warnings] : {std::pair{"/old/x.KDX", 0}, {"/old/x_Optimisation.kdx", 1}}) {
+  const std::tuple<const char*, const char*, int> cases[] = {
+      {"/old/x.KDX", "x.kdx", 0}, {"/old/x_Optimisation.kdx", "x.kdx", 1}, {"/old/\xEF\xBF\xBD.kdx", "\xE4.kdx", 0}};
+  for (const auto& [named, setup, warnings] : cases) {
     std::vector<std::string> paths;
     for (const char* file : {"x_Optimisation.dat", "x_Optimisation_Run.dat"}) {
-      paths.push_back(folder.write(file, std::string("# Title\n# Setup file: ") + setup + "\n1\tOK\n"));
+      paths.push_back(folder.write(file, std::string("# Title\n# Setup file: ") + named + "\n1\tOK\n"));
     }
     RunLog log;
-    EXPECT_THAT(keepEarlierResults(paths, folder / "x.kdx", log), Each(HasSubstr("/x_Optimisation")));
-    EXPECT_EQ(log.warningCount(), warnings) << setup;
+    keepEarlierResults(paths, folder / setup, log);
+    for (const std::string& path : paths) EXPECT_FALSE(std::filesystem::exists(path));
+    EXPECT_EQ(log.warningCount(), warnings) << named;
   }
 }
 
