@@ -11,8 +11,8 @@ namespace mirevo {
 /// of the setup. What an earlier run made is kept with a number before the extension: `basin_Saved.2`,
 /// `basin_Optimisation.1.dat`.
 struct RunFile {
-  std::string_view stem = "";
-  std::string_view extension = "";
+  std::string_view stem = {};
+  std::string_view extension = {};
   bool isNumbered = false;   ///< a number follows the stem
   bool mayBeModels = false;  ///< so plain a name that only the content tells it from a file of the model
   /// What the first lines of every such file contain, in every version of the program. Empty: nothing, and the name is
