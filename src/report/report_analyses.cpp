@@ -18,6 +18,7 @@
 #include "common/text.h"
 #include "evaluation/stored_results.h"
 #include "measures/period_series.h"
+#include "parameters/parameter_fields.h"
 #include "parameters/parameter_model.h"
 #include "parameters/read_template.h"
 #include "platform/series/time_series_object.h"
@@ -134,9 +135,8 @@ std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, 
   if (std::none_of(rows.begin(), rows.end(), isBase)) return std::nullopt;
   StoredResults evaluator = resultsOf(config, rows);
   ParameterModel parameters(config.parameters, config.constraints);
-  const LocalSensitivity found =
-      localSensitivity(settings, space, evaluator, ofVariableParameters(fieldWidths(config), config.parameters),
-                       parameters.feasibility());
+  const LocalSensitivity found = localSensitivity(
+      settings, space, evaluator, parameterFields(parameters, fieldWidths(config)), parameters.feasibility());
   ReportedSensitivity reported;
   reported.parameters = space.names;
   for (const OutputMeasure& measure : config.measures) reported.outputs.push_back(measure.name);

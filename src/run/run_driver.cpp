@@ -297,7 +297,7 @@ TaskContext RunDriver::taskContext() {
           [this](const SearchSummary& summary) { reporter_->takeBestOf(summary); },
           filePrefix_,
           runner_->observedSeries(),
-          widestPlaceholders(runner_->templates(), config_.parameters.size()),
+          parameterFields(*parameters_, widestPlaceholders(runner_->templates(), config_.parameters.size())),
           parameters_->feasibility(),
           [this](std::string_view text) { warn(text); }};
 }

@@ -9,9 +9,9 @@
 
 #include <fmt/core.h>
 
+#include "algorithms/analyses/written_step.h"
 #include "common/run_files.h"
 #include "common/text.h"
-#include "parameters/value_format.h"
 
 namespace mirevo {
 
@@ -60,6 +60,12 @@ Step wantedStep(const SensitivitySettings& settings, const SearchSpace& space, s
   return step;
 }
 
+/// Whether there is room for a step; 0.3 - 0.1 is 0.19999999999999998, but a step of 0.2 fits.
+bool fits(double step, double room) {
+  constexpr double kRounding = 1.0 + 1.0e-12;
+  return step <= room * kRounding;
+}
+
 /// Why the base set with this value of parameter j cannot be run; empty if it can.
 std::optional<std::string> violationAt(double value, std::size_t j, ParameterSet base, const Feasibility& feasibility) {
   if (!feasibility.isTested()) return std::nullopt;
@@ -87,8 +93,8 @@ ParameterDifference planDifference(const Step& step, bool central, std::size_t j
     }
     return difference;
   }
-  const bool fitsUp = step.up <= step.roomUp;
-  const bool fitsDown = step.down <= step.roomDown;
+  const bool fitsUp = fits(step.up, step.roomUp);
+  const bool fitsDown = fits(step.down, step.roomDown);
   const double above = x + std::min(step.up, step.roomUp);
   const double below = x - std::min(step.down, step.roomDown);
   const auto violationAbove = violationAt(above, j, sets.front(), feasibility);
@@ -120,48 +126,6 @@ ParameterDifference planDifference(const Step& step, bool central, std::size_t j
   difference.widthAbove = sets[difference.plus][j] - x;
   if (!(difference.width > 0.0)) difference.problem = "the perturbation is too small to change its value";
   return difference;
-}
-
-/// The search-scale value of what the model reads for a value of parameter j; empty if the field holds no number.
-std::optional<double> searchValueAsWritten(const SearchSpace& space, std::size_t j, double value, int fieldWidth) {
-  const double modelValue = toModelScale(space, j, value);
-  const std::optional<double> written = valueAsWritten(modelValue, fieldWidth);
-  if (!written || *written == modelValue) return written ? std::optional(value) : std::nullopt;
-  if (space.transformation[j] != TransformationType::logarithmic) return written;
-  return *written > 0.0 ? std::optional(std::log(*written)) : std::nullopt;
-}
-
-/// Takes the width of a difference as the model gets it from a field of this many characters.
-void takeWidthAsWritten(const SearchSpace& space, std::size_t j, int fieldWidth, std::span<const ParameterSet> sets,
-                        ParameterDifference& difference) {
-  constexpr double kWorthAWarning = 0.01;
-  constexpr double kExact = 1.0e-9;  // a field that holds 15 digits: what it cuts is no more than a rounding error
-  const double minusValue = sets[difference.minus][j];
-  const double plusValue = sets[difference.plus][j];
-  const std::optional<double> minus = searchValueAsWritten(space, j, minusValue, fieldWidth);
-  const std::optional<double> plus = searchValueAsWritten(space, j, plusValue, fieldWidth);
-  const double wanted = difference.width;
-  difference.width = minus && plus ? *plus - *minus : 0.0;
-  if (std::abs(difference.width - wanted) <= kExact * wanted) {
-    difference.width = wanted;
-    return;
-  }
-  if (difference.isCentral()) {
-    const double base = searchValueAsWritten(space, j, sets.front()[j], fieldWidth).value_or(kNaN);
-    difference.widthBelow = minus ? base - *minus : kNaN;
-    difference.widthAbove = plus ? *plus - base : kNaN;
-  }
-  const std::string fields =
-      fmt::format("in its field of {} characters {} is written as \"{}\" and {} as \"{}\"", fieldWidth,
-                  formatReal(toModelScale(space, j, minusValue)),
-                  trim(FormatValueForPlaceholder(toModelScale(space, j, minusValue), fieldWidth)),
-                  formatReal(toModelScale(space, j, plusValue)),
-                  trim(FormatValueForPlaceholder(toModelScale(space, j, plusValue), fieldWidth)));
-  if (difference.width == 0.0) {
-    difference.problem = fields;
-  } else if (std::abs(difference.width - wanted) > kWorthAWarning * wanted) {
-    difference.warnings.push_back(fields + "; the difference is that of the values as written");
-  }
 }
 
 SensitivityTable tabulate(const PerturbationPlan& plan, std::span<const EvaluationResult> results,
@@ -304,7 +268,7 @@ const SettingSection<SensitivitySettings>& localSensitivitySection() {
 }
 
 PerturbationPlan planPerturbations(const SensitivitySettings& settings, const SearchSpace& space,
-                                   std::span<const double> base, std::span<const int> fieldWidths,
+                                   std::span<const double> base, const ParameterFields& fields,
                                    const Feasibility& feasibility) {
   PerturbationPlan plan;
   plan.sets.emplace_back(base.begin(), base.end());
@@ -312,33 +276,23 @@ PerturbationPlan planPerturbations(const SensitivitySettings& settings, const Se
     const Step step = wantedStep(settings, space, base, j);
     const bool isCentral = settings.differencing == Differencing::central;
     plan.differences.push_back(planDifference(step, isCentral, j, feasibility, plan.sets));
-    const int fieldWidth = j < fieldWidths.size() ? fieldWidths[j] : 0;
-    if (fieldWidth == 0 || !plan.differences.back().problem.empty()) continue;
-    takeWidthAsWritten(space, j, fieldWidth, plan.sets, plan.differences.back());
+    if (!plan.differences.back().problem.empty()) continue;
+    takeWidthAsWritten(fields, space, j, plan.sets, plan.differences.back());
   }
   return plan;
 }
 
-std::vector<int> ofVariableParameters(std::span<const int> fieldWidths, std::span<const ModelParameter> parameters) {
-  std::vector<int> widths;
-  for (std::size_t i = 0; i < fieldWidths.size(); ++i) {
-    if (parameters[i].parameterType == ParameterType::variable) widths.push_back(fieldWidths[i]);
-  }
-  return widths;
-}
-
 bool hasRoomForStep(const SensitivitySettings& settings, const SearchSpace& space, std::size_t j) {
-  constexpr double kRounding = 1.0 + 1.0e-12;
   const Step step = wantedStep(settings, space, space.initial, j);
   // Bounds that leave a single value leave no parameter to perturb; it is left out by name.
   if (step.roomUp + step.roomDown == 0.0) return true;
-  return step.up <= step.roomUp * kRounding || step.down <= step.roomDown * kRounding;
+  return fits(step.up, step.roomUp) || fits(step.down, step.roomDown);
 }
 
 LocalSensitivity localSensitivity(const SensitivitySettings& settings, const SearchSpace& space, Evaluator& evaluator,
-                                  std::span<const int> fieldWidths, const Feasibility& feasibility) {
+                                  const ParameterFields& fields, const Feasibility& feasibility) {
   LocalSensitivity sensitivity;
-  sensitivity.plan = planPerturbations(settings, space, space.initial, fieldWidths, feasibility);
+  sensitivity.plan = planPerturbations(settings, space, space.initial, fields, feasibility);
   sensitivity.results = evaluator.evaluateParameterSets(sensitivity.plan.sets, DispatchMode::task);
   noteFailures(sensitivity.plan, sensitivity.results);
   sensitivity.measures = tabulate(sensitivity.plan, sensitivity.results, &EvaluationResult::measureValues);

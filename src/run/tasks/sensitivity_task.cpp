@@ -174,8 +174,8 @@ int SensitivityTask::plannedEvaluations(std::size_t variableCount) const {
 
 TaskOutcome SensitivityTask::outcomeOf(const TaskContext& context, Evaluator& evaluator) const {
   TaskOutcome outcome{std::string(kEndOfTask)};
-  const std::vector<int> fieldWidths = ofVariableParameters(context.fieldWidths, context.parameters);
-  LocalSensitivity sensitivity = localSensitivity(settings, context.space, evaluator, fieldWidths, context.feasibility);
+  LocalSensitivity sensitivity =
+      localSensitivity(settings, context.space, evaluator, context.fields, context.feasibility);
   Linearised found;
   if (settings.calculatesCovariance) found = linearised(context, sensitivity);
   if (found.model) takeObservations(*found.model, sensitivity);
