@@ -27,7 +27,7 @@ namespace mirevo {
 namespace {
 
 /// An evaluator that answers with the results in the rows; an evaluation that is not there counts as failed.
-StoredResults resultsOf(const RunConfig& config, std::span<const ResultRow> rows) {
+StoredResults resultsOf(const RunConfig& config, std::span<const ResultRow> rows, const PairsByNumber& pairs) {
   std::map<int, EvaluationResult> results;
   for (const ResultRow& row : rows) {
     EvaluationResult& result = results[row.number];
@@ -35,6 +35,7 @@ StoredResults resultsOf(const RunConfig& config, std::span<const ResultRow> rows
     result.objectiveValues = row.objectives;
     result.aggregate = row.aggregate;
     if (!row.ok) result.failure.emplace();
+    if (const auto found = pairs.find(row.number); found != pairs.end()) result.pairs = found->second;
   }
   EvaluationResult missing;
   missing.measureValues.assign(config.measures.size(), kFailedRunValue);
@@ -130,13 +131,15 @@ std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::stri
 }
 
 std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, const SensitivitySettings& settings,
-                                                       const SearchSpace& space, std::span<const ResultRow> rows) {
+                                                       const SearchSpace& space, std::span<const ResultRow> rows,
+                                                       const PairsByNumber& pairs) {
   const auto isBase = [](const ResultRow& row) { return row.number == 1 && row.ok; };
   if (std::none_of(rows.begin(), rows.end(), isBase)) return std::nullopt;
-  StoredResults evaluator = resultsOf(config, rows);
+  StoredResults evaluator = resultsOf(config, rows, pairs);
   ParameterModel parameters(config.parameters, config.constraints);
-  const LocalSensitivity found = localSensitivity(
-      settings, space, evaluator, parameterFields(parameters, fieldWidths(config)), parameters.feasibility());
+  const LocalSensitivity found =
+      localSensitivity(settings, space, evaluator, parameterFields(parameters, fieldWidths(config)),
+                       parameters.feasibility(), config.objectives, config.measures);
   ReportedSensitivity reported;
   reported.parameters = space.names;
   for (const OutputMeasure& measure : config.measures) reported.outputs.push_back(measure.name);

@@ -9,6 +9,7 @@
 #include "algorithms/analyses/local_sensitivity.h"
 #include "parameters/search_space.h"
 #include "report/report_data.h"
+#include "run/results/pairs_file.h"
 #include "run/results/result_row.h"
 #include "run/setup/run_config.h"
 
@@ -22,9 +23,11 @@ std::string pairName(std::span<const OutputMeasure> measures, std::size_t measur
 /// cannot be read are left out.
 std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::string& filePrefix);
 
-/// The results of a local sensitivity analysis, computed from its rows; empty without a row for the initial values.
+/// The results of a local sensitivity analysis, computed from its rows and the pairs of its runs; empty without a row for the
+/// initial values.
 std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, const SensitivitySettings& settings,
-                                                       const SearchSpace& space, std::span<const ResultRow> rows);
+                                                       const SearchSpace& space, std::span<const ResultRow> rows,
+                                                       const PairsByNumber& pairs);
 
 /// Takes the composites over the observations, and the ranking by them, from the tables of a finished analysis, if it
 /// has written any.

@@ -52,6 +52,7 @@ class ReportBuilder final {
   void addEvaluations();
   void findBestAndInitial();
   void addMeasures();
+  PairsByNumber pairsOfRuns() const;
   void noteFewerPairsOfBest();
   void addFailures();
   void addSeries();
@@ -198,11 +199,14 @@ void ReportBuilder::addMeasures() {
   }
 }
 
+PairsByNumber ReportBuilder::pairsOfRuns() const {
+  return readPairs(filePrefix_, config_.task->facts().resultFiles).content.value_or(PairsByNumber{});
+}
+
 /// In a run that has come to its end the closing lines of its results say so.
 void ReportBuilder::noteFewerPairsOfBest() {
   if (best_ == nullptr || !data_.summary.empty()) return;
-  const PairsByNumber pairs =
-      readPairs(filePrefix_, config_.task->facts().resultFiles).content.value_or(PairsByNumber{});
+  const PairsByNumber pairs = pairsOfRuns();
   const auto ofBest = pairs.find(best_->number);
   if (ofBest == pairs.end()) return;
   for (const MeasurePairs& found : ofBest->second) {
@@ -271,7 +275,7 @@ void ReportBuilder::addAnalyses() {
   const TaskReport task = config_.task->report();
   if (task.hasBands && hasAnalysis) data_.bands = reportedBands(config_, filePrefix_);
   if (task.sensitivity != nullptr) {
-    data_.sensitivity = reportedSensitivity(config_, *task.sensitivity, space(), sources_.results.rows);
+    data_.sensitivity = reportedSensitivity(config_, *task.sensitivity, space(), sources_.results.rows, pairsOfRuns());
   }
   if (!isFinished && (analysed || data_.sensitivity)) {
     const std::vector<bool>& ok = data_.evaluations.ok;

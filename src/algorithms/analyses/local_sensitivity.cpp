@@ -9,6 +9,7 @@
 
 #include <fmt/core.h>
 
+#include "algorithms/analyses/compared_observations.h"
 #include "algorithms/analyses/written_step.h"
 #include "common/run_files.h"
 #include "common/text.h"
@@ -129,7 +130,7 @@ ParameterDifference planDifference(const Step& step, bool central, std::size_t j
 }
 
 SensitivityTable tabulate(const PerturbationPlan& plan, std::span<const EvaluationResult> results,
-                          std::vector<double> EvaluationResult::*values) {
+                          std::vector<double> EvaluationResult::*values, const IncomparableOutputs& incomparable) {
   std::vector<std::vector<double>> outputs;
   for (const EvaluationResult& result : results) {
     outputs.push_back(result.ok() ? result.*values : std::vector<double>{});
@@ -137,9 +138,20 @@ SensitivityTable tabulate(const PerturbationPlan& plan, std::span<const Evaluati
   SensitivityTable table;
   const EvaluationResult& base = results.front();
   table.base = base.ok() ? base.*values : std::vector<double>((base.*values).size(), kNaN);
+  for (std::size_t k = 0; k < outputs.size(); ++k) {
+    for (std::size_t i = 0; i < std::min(outputs[k].size(), incomparable[k].size()); ++i) {
+      if (!incomparable[k][i].empty()) outputs[k][i] = kNaN;
+    }
+  }
   table.derivatives = differenceColumns(plan, outputs);
   for (std::size_t j = 0; j < plan.differences.size(); ++j) {
     table.derivatives[j].resize(table.base.size(), kNaN);
+    std::vector<std::string>& problems = table.problems.emplace_back(table.base.size(), plan.differences[j].problem);
+    for (const std::size_t k : {plan.differences[j].minus, plan.differences[j].plus}) {
+      for (std::size_t i = 0; i < std::min(problems.size(), incomparable[k].size()); ++i) {
+        if (problems[i].empty() && std::isnan(table.derivatives[j][i])) problems[i] = incomparable[k][i];
+      }
+    }
     std::vector<double> scaled;
     double squares = 0.0;
     std::size_t known = 0;
@@ -174,6 +186,56 @@ void noteFailures(PerturbationPlan& plan, std::span<const EvaluationResult> resu
   }
 }
 
+/// The measures that do not compare, where the two runs of a difference judge the model by different observations.
+IncomparableOutputs incomparableMeasures(const PerturbationPlan& plan, std::span<const EvaluationResult> results) {
+  const ComparedObservations observations(results);
+  IncomparableOutputs found(results.size());
+  const bool hasBase = results.front().ok();
+  for (const ParameterDifference& difference : plan.differences) {
+    const std::size_t minus = difference.minus;
+    const std::size_t plus = difference.plus;
+    if (!results[minus].ok() || !results[plus].ok()) continue;
+    for (std::size_t i = 0; i < results[plus].measureValues.size(); ++i) {
+      if (observations.areSame(minus, plus, i)) continue;
+      for (const auto& [one, other] : {std::pair(minus, plus), std::pair(plus, minus)}) {
+        if (one == 0 || (hasBase && observations.areSame(one, 0, i))) continue;
+        found[one].resize(results[one].measureValues.size());
+        found[one][i] =
+            observations.differenceText(one, hasBase ? 0 : other, i,
+                                        hasBase ? "the base run" : fmt::format("evaluation {}", results[other].number));
+      }
+    }
+  }
+  return found;
+}
+
+/// Says of each measure that does not compare whether its difference is one-sided or unknown.
+void noteIncomparable(const IncomparableOutputs& incomparable, const SensitivityTable& measures,
+                      std::span<const OutputMeasure> names, PerturbationPlan& plan) {
+  constexpr std::size_t kMostNamed = 5;
+  for (std::size_t j = 0; j < plan.differences.size(); ++j) {
+    ParameterDifference& difference = plan.differences[j];
+    for (const bool isUnknown : {false, true}) {
+      std::string list;
+      std::string reason;
+      std::size_t count = 0;
+      for (std::size_t i = 0; i < names.size() && difference.problem.empty(); ++i) {
+        const auto& below = incomparable[difference.minus];
+        const auto& ofRun = below.empty() || below[i].empty() ? incomparable[difference.plus] : below;
+        if (ofRun.empty() || ofRun[i].empty() || isUnknown != std::isnan(measures.derivatives[j][i])) continue;
+        if (reason.empty()) reason = ofRun[i];
+        if (++count <= kMostNamed) list += fmt::format("{}{}", count == 1 ? "" : ", ", quotedForMessage(names[i].name));
+      }
+      if (count == 0) continue;
+      if (count > kMostNamed) list += fmt::format(" and {} more", count - kMostNamed);
+      difference.warnings.push_back(
+          isUnknown
+              ? fmt::format("it has no derivatives of {} and their objective functions: {}", list, reason)
+              : fmt::format("its differences of {} and their objective functions are one-sided: {}", list, reason));
+    }
+  }
+}
+
 /// Whether just one side of a central difference has no value.
 bool lacksOneSide(const ParameterDifference& difference, double below, double above) {
   return difference.isCentral() && std::isnan(below) != std::isnan(above);
@@ -188,30 +250,18 @@ double quotient(const ParameterDifference& difference, double below, double base
   return (std::isnan(below) ? above - base : base - below) / width;
 }
 
-/// Whether a run has no value for an observation that the base run has one for: their measures do not compare.
-bool comparesFewerValues(const EvaluationResult& result, const EvaluationResult& base) {
-  for (const UnusedObservations& unused : result.unusedObservations) {
-    const auto ofBase = std::find_if(base.unusedObservations.begin(), base.unusedObservations.end(),
-                                     [&](const UnusedObservations& other) { return other.measure == unused.measure; });
-    if (ofBase == base.unusedObservations.end() || unused.usedCount < ofBase->usedCount) return true;
-  }
-  // After a restart, where a task keeps the values.
-  for (std::size_t i = 0; i < std::min(result.simulatedValues.size(), base.simulatedValues.size()); ++i) {
-    if (std::isnan(result.simulatedValues[i]) && !std::isnan(base.simulatedValues[i])) return true;
-  }
-  return false;
-}
-
 /// The warning of perturbed runs that fit better than the base set; empty where there is none.
 std::string betterFitText(std::span<const EvaluationResult> results) {
   constexpr double kRounding = 1.0 - 1.0e-6;  // of the statistics, in 32 bits
   const EvaluationResult& base = results.front();
   const EvaluationResult* best = nullptr;
   std::size_t count = 0;
-  for (const EvaluationResult& result : results) {
+  const ComparedObservations observations(results);
+  for (std::size_t i = 1; i < results.size(); ++i) {
+    const EvaluationResult& result = results[i];
     // A negative aggregate is no measure of a misfit.
     if (!base.ok() || !result.ok() || !(result.aggregate >= 0.0 && result.aggregate < base.aggregate * kRounding) ||
-        comparesFewerValues(result, base)) {
+        !observations.areSame(i, 0)) {
       continue;
     }
     ++count;
@@ -290,13 +340,19 @@ bool hasRoomForStep(const SensitivitySettings& settings, const SearchSpace& spac
 }
 
 LocalSensitivity localSensitivity(const SensitivitySettings& settings, const SearchSpace& space, Evaluator& evaluator,
-                                  const ParameterFields& fields, const Feasibility& feasibility) {
+                                  const ParameterFields& fields, const Feasibility& feasibility,
+                                  std::span<const ObjectiveFunction> objectives,
+                                  std::span<const OutputMeasure> measures) {
   LocalSensitivity sensitivity;
   sensitivity.plan = planPerturbations(settings, space, space.initial, fields, feasibility);
   sensitivity.results = evaluator.evaluateParameterSets(sensitivity.plan.sets, DispatchMode::task);
   noteFailures(sensitivity.plan, sensitivity.results);
-  sensitivity.measures = tabulate(sensitivity.plan, sensitivity.results, &EvaluationResult::measureValues);
-  sensitivity.objectives = tabulate(sensitivity.plan, sensitivity.results, &EvaluationResult::objectiveValues);
+  const IncomparableOutputs incomparable = incomparableMeasures(sensitivity.plan, sensitivity.results);
+  sensitivity.measures =
+      tabulate(sensitivity.plan, sensitivity.results, &EvaluationResult::measureValues, incomparable);
+  sensitivity.objectives = tabulate(sensitivity.plan, sensitivity.results, &EvaluationResult::objectiveValues,
+                                    ofObjectives(incomparable, objectives));
+  noteIncomparable(incomparable, sensitivity.measures, measures, sensitivity.plan);
   const bool hasObjectives = !sensitivity.objectives.base.empty();
   sensitivity.ranking = ranked(hasObjectives ? sensitivity.objectives.composite : sensitivity.measures.composite);
   return sensitivity;
@@ -393,7 +449,7 @@ std::vector<DataTable> sensitivityTables(const LocalSensitivity& sensitivity, co
     const auto add = [&](const std::string& kind, const SensitivityTable& found, std::span<const std::string> outputs) {
       for (std::size_t i = 0; i < outputs.size(); ++i) {
         table.rows.push_back({names.parameters[j], kind, outputs[i], found.derivatives[j][i], found.scaled[j][i],
-                              found.composite[j], sensitivity.plan.differences[j].problem});
+                              found.composite[j], found.problems[j][i]});
       }
     };
     add("measure", sensitivity.measures, names.measures);

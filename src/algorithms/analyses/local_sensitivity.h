@@ -9,6 +9,8 @@
 #include "algorithms/analyses/uncertainty.h"
 #include "common/settings/keyword_row.h"
 #include "evaluation/evaluator.h"
+#include "measures/objective_functions.h"
+#include "measures/output_measure.h"
 #include "parameters/feasibility.h"
 #include "parameters/parameter_fields.h"
 #include "parameters/search_space.h"
@@ -70,6 +72,7 @@ struct SensitivityTable {
   /// Dimensionless: derivative times the parameter's extent, divided by the absolute value of the output; NaN where
   /// that is 0.
   std::vector<std::vector<double>> scaled;
+  std::vector<std::vector<std::string>> problems;  ///< p rows of m: why there is no derivative
   std::vector<double> composite;  ///< root mean square of the known scaled derivatives, one per parameter
 };
 
@@ -91,9 +94,12 @@ std::vector<std::size_t> ranked(std::span<const double> values);
 
 /// Evaluates all perturbed sets in one batch, the base set (the space's initial values) first. Where one of the two
 /// runs of a central difference failed, the other and the base set give a one-sided one; else a failed run leaves its
-/// parameter's derivatives out. The plan says so.
+/// parameter's derivatives out. Where one judges the model by other observations than the base set, by a measure of
+/// `measures`, the same is done for this measure and the objective functions that contain it. The plan says so.
 LocalSensitivity localSensitivity(const SensitivitySettings& settings, const SearchSpace& space, Evaluator& evaluator,
-                                  const ParameterFields& fields = {}, const Feasibility& feasibility = {});
+                                  const ParameterFields& fields = {}, const Feasibility& feasibility = {},
+                                  std::span<const ObjectiveFunction> objectives = {},
+                                  std::span<const OutputMeasure> measures = {});
 
 /// The derivatives of any outputs by differences: p columns, one row per value; NaN for a parameter with a problem.
 /// `outputs[i]` are the values of set i; those of a failed set may be empty. A value that one side of a central

@@ -297,9 +297,8 @@ TEST(LocalSensitivity, SaysOnceThatOthersFitBetter) {
     sensitivity.results[i].number = static_cast<int>(i) + 1;
     sensitivity.results[i].aggregate = aggregates[i];
   }
-  sensitivity.results[0].unusedObservations = {{0, 10, ""}};
-  sensitivity.results[1].unusedObservations = {{0, 10, ""}};
-  sensitivity.results[3].unusedObservations = {{0, 9, ""}};
+  sensitivity.results[0].pairs = {{.measure = 0, .count = 10}};
+  sensitivity.results[3].pairs = {{.measure = 0, .count = 9}};
   const auto warnings = [&] {
     std::vector<std::string> found;
     for (const std::string& line : formatSensitivity(sensitivity, {})) {
@@ -309,10 +308,52 @@ TEST(LocalSensitivity, SaysOnceThatOthersFitBetter) {
   };
   EXPECT_THAT(warnings(), ElementsAre("Warning: 2 evaluations fit better than the base set, evaluation 3 best: its "
                                       "aggregate is 2, not 4"));
-  sensitivity.results[0].simulatedValues = {1, 2};
-  sensitivity.results[2].simulatedValues = {1, NAN};
+  sensitivity.results[2].pairs = {{.measure = 0, .count = 11}};
   EXPECT_THAT(warnings(),
               ElementsAre("Warning: evaluation 2 fits better than the base set: its aggregate is 3, not 4"));
+}
+
+// The first measure is larger by 100 for each pair.
+TEST(LocalSensitivity, ComparesMeasuresOfTheSameObservationsOnly) {
+  const SearchSpace space = spaceOf({{kNone, 2, 0, 4}});
+  const std::vector<OutputMeasure> measures{{.name = "flow"}, {.name = "level"}, {.name = "peak"}};
+  const std::vector<ObjectiveFunction> objectives{{.name = "both", .measures = {0, 1}},
+                                                  {.name = "third", .measures = {2}}};
+  // differencing, pairs of flow in the base run and in those above and below, the derivative of flow, the warning
+  const std::tuple<Differencing, std::size_t, std::size_t, std::size_t, double, std::string> cases[] = {
+      {kCentral, 9, 9, 9, 1, ""},
+      {kCentral, 9, 8, 9, 1,
+       "its differences of \"flow\" and their objective functions are one-sided: evaluation 3 has 8 pairs of simulated "
+       "and observed values, the base run 9"},
+      {kCentral, 8, 9, 9, 1, ""},
+      {kCentral, 9, 8, 7, NAN, "it has no derivatives of \"flow\" and their objective functions: evaluation 2 has 7"},
+      {kForward, 9, 8, 9, NAN, "it has no derivatives of \"flow\" and their objective functions: evaluation 2 has 8"},
+      {kForward, 8, 9, 9, NAN, "it has no derivatives of \"flow\" and their objective functions: evaluation 2 has 9"},
+  };
+  for (const auto& [differencing, base, above, below, derivative, warning] : cases) {
+    FunctionEvaluator evaluator([&](const ParameterSet& p) {
+      const std::size_t count = p[0] > 2 ? above : p[0] < 2 ? below : base;
+      EvaluationResult result;
+      result.measureValues = {p[0] + 100.0 * static_cast<double>(count), 2 * p[0], 3 * p[0]};
+      result.objectiveValues = {result.measureValues[0] + 2 * p[0], 3 * p[0]};
+      if (p[0] == 2 || count != base) result.pairs = {{.measure = 0, .count = count}, {.measure = 1, .count = 5}};
+      return result;
+    });
+    const LocalSensitivity found =
+        localSensitivity({differencing, kOfRange, 0.1}, space, evaluator, {}, {}, objectives, measures);
+    EXPECT_NEAR(found.measures.derivatives[0][1], 2, 1e-12);
+    EXPECT_NEAR(found.objectives.derivatives[0][1], 3, 1e-12);
+    EXPECT_EQ(found.plan.differences[0].warnings.size(), warning.empty() ? 0U : 1U) << base << above << below;
+    for (const std::string& text : found.plan.differences[0].warnings) EXPECT_THAT(text, StartsWith(warning));
+    if (std::isnan(derivative)) {
+      EXPECT_TRUE(std::isnan(found.measures.derivatives[0][0]) && std::isnan(found.objectives.derivatives[0][0]));
+      EXPECT_THAT(found.objectives.problems[0][0], StartsWith("evaluation 2 has")) << base << above << below;
+      continue;
+    }
+    EXPECT_NEAR(found.measures.derivatives[0][0], 1, 1e-12) << base << above << below;
+    EXPECT_NEAR(found.objectives.derivatives[0][0], 3, 1e-12) << base << above << below;
+    EXPECT_EQ(found.objectives.problems[0][0], "");
+  }
 }
 
 TEST(LocalSensitivity, OfAFailedBaseSetHasCentralDerivativesOnly) {
