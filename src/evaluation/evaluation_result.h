@@ -86,6 +86,9 @@ struct EvaluationResult {
   std::vector<double> measureValues;    ///< one per output measure
   std::vector<double> objectiveValues;  ///< one per objective function
   double aggregate = kFailedRunValue;   ///< what the searches minimise
+  /// If the task asks for them, the output measures in 64 bits, from all digits of the series; a number that the model
+  /// wrote is the one of `measureValues`. Empty for a failed evaluation.
+  std::vector<double> exactMeasures;
   /// If the task asks for them, the simulated values at the observation times of ModelRunner::observedSeries(), one
   /// series after another, NaN where the model has none; exact ones with their units, see appendSimulatedValues().
   /// Empty for a failed evaluation.

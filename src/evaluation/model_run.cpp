@@ -268,6 +268,7 @@ std::vector<PeriodSeries> ModelRunner::readShownObservations() {
 EvaluationResult ModelRunner::judge(int slot) {
   EvaluationResult result;
   result.measureValues.assign(description_.measures.size(), std::nan(""));
+  if (description_.computeExactMeasures) result.exactMeasures = result.measureValues;
   auto failure = findBatchFailure(slot);
   if (!failure) failure = findMissingResults(slot);
   if (!failure) failure = readMeasures(slot, result);
@@ -372,6 +373,7 @@ std::optional<EvaluationFailure> ModelRunner::readMeasures(int slot, EvaluationR
     const auto number = static_cast<std::size_t>(measure.measurementNo);
     if (number <= written.size()) {
       result.measureValues[i] = written[number - 1];
+      if (description_.computeExactMeasures) result.exactMeasures[i] = written[number - 1];
     } else {
       failure = makeFailure(
           Kind::resultsNotReadable,
@@ -408,6 +410,10 @@ std::optional<EvaluationFailure> ModelRunner::readSeriesMeasure(int slot, std::s
     const MeasureStatistics statistics =
         computeMeasureStatistics(measure, description_.period, simulation, series_.observation(i));
     result.measureValues[i] = selectStatistic(statistics, measure.statisticType);
+    if (description_.computeExactMeasures) {
+      result.exactMeasures[i] =
+          measureValue(measure, description_.period, simulation, series_.observation(i), SeriesPrecision::exact);
+    }
     noteUnusedObservations(i, statistics, result);
     result.pairs.push_back(pairsOf(i, statistics, simulation));
     return findLackOfPairs(i, statistics.simulatedValues.size(), slot);

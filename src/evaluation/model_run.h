@@ -34,6 +34,7 @@ struct ModelDescription {
   std::vector<std::string> savedFiles;  ///< files kept from every model run
   std::string savedFolder;              ///< where they are kept
   std::string failedFolderPrefix;       ///< path of a failed run's folder, without the evaluation number that follows
+  bool computeExactMeasures = false;    ///< results hold the measures in 64 bits, too
   bool keepSimulatedValues = false;     ///< results hold the simulated values at the observation times
   SeriesPrecision keptPrecision = SeriesPrecision::single;
 };

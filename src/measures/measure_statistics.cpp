@@ -23,6 +23,12 @@ struct SeriesItem {
   std::string fileName;
   DateRecord start;
   std::optional<float> deleteValue;
+  std::optional<std::span<const double>> exact;  ///< its values in 64 bits; none where those in 32 bits are used
+
+  std::optional<double> valueAtTime(double time, std::size_t& hint) const {
+    if (exact) return exactValueAt(series.times(), *exact, time, hint);
+    return valueAt(series, item, time, hint);
+  }
 };
 
 /// A span of time in days since the start of a file.
@@ -31,7 +37,7 @@ struct Period {
   double end;
 };
 
-SeriesItem readItem(TimeSeriesObject& series, const SeriesReference& reference) {
+SeriesItem readItem(TimeSeriesObject& series, const SeriesReference& reference, SeriesPrecision precision) {
   const std::string name(trimTrailing(reference.fileName));
   requireItem(series, reference);
   const std::optional<DateRecord> start = series.startTime();
@@ -41,18 +47,27 @@ SeriesItem readItem(TimeSeriesObject& series, const SeriesReference& reference) 
   if (series.times().size() != static_cast<std::size_t>(series.timeStepCount())) {
     fatalError("Error getting time step of TS object in " + name, series.lastError());
   }
-  return {series, reference.itemNo, name, *start, deleteValue};
+  SeriesItem item{series, reference.itemNo, name, *start, deleteValue, std::nullopt};
+  if (precision == SeriesPrecision::exact) item.exact = series.exactValues(reference.itemNo);
+  return item;
 }
 
 Period periodOn(const DateRecord& axisStart, const EvaluationPeriod& period) {
   return {daysSince(axisStart, period.start), daysSince(axisStart, period.end)};
 }
 
-/// The weighted difference of a simulated and an observed value.
-float weightedDifference(float simulated, float observed, float weight, float weightAbove) {
-  const float difference = simulated - observed;
-  return difference <= 0.0F ? weight * difference : weightAbove * difference;
-}
+/// The weights of differences that are not positive, and of those that are, in the number in which all is computed.
+template <class Number>
+struct Weights {
+  Number atOrBelow;
+  Number above;
+
+  /// The weighted difference of a simulated and an observed value.
+  Number difference(double simulated, double observed) const {
+    const Number e = static_cast<Number>(simulated) - static_cast<Number>(observed);
+    return e <= 0 ? atOrBelow * e : above * e;
+  }
+};
 
 std::string describeSpan(const SeriesItem& item) {
   const std::span<const double> times = item.series.times();
@@ -86,7 +101,8 @@ void forEachObservation(const SeriesItem& simulation, const SeriesItem& observat
     if (time < days.start - kSameTimeDays) continue;
     if (time > days.end + kSameTimeDays) break;
     if (isMissing(observed[k], observation.deleteValue)) continue;
-    if (!use(time, observed[k], valueAt(simulation.series, simulation.item, time, hint))) break;
+    const double value = observation.exact ? (*observation.exact)[k] : observed[k];
+    if (!use(time, value, simulation.valueAtTime(time, hint))) break;
   }
 }
 
@@ -96,7 +112,7 @@ MeasureStatistics collectPairs(const SeriesItem& simulation, const SeriesItem& o
   MeasureStatistics statistics;
   std::optional<double> firstUnused;
   forEachObservation(simulation, observation, period,
-                     [&](double time, float observed, const std::optional<float>& simulated) {
+                     [&](double time, double observed, const std::optional<double>& simulated) {
                        ++statistics.observationCount;
                        if (simulated) {
                          statistics.times.push_back(time);
@@ -121,28 +137,30 @@ MeasureStatistics collectPairs(const SeriesItem& simulation, const SeriesItem& o
   return statistics;
 }
 
-/// Mean, root mean square and standard deviation over the pairs. Deliberately in single precision and in observation
-/// order.
-void addDifferenceStatistics(float weight, float weightAbove, MeasureStatistics& statistics) {
-  float sum = 0.0F;
-  float sumOfSquares = 0.0F;
+/// Mean, root mean square and standard deviation over the pairs, in observation order, every operation in this number.
+template <class Number>
+void addDifferenceStatistics(const Weights<Number>& weights, MeasureStatistics& statistics) {
+  Number sum = 0;
+  Number sumOfSquares = 0;
   for (std::size_t i = 0; i < statistics.simulatedValues.size(); ++i) {
-    const float e =
-        weightedDifference(statistics.simulatedValues[i], statistics.observedValues[i], weight, weightAbove);
+    const Number e = weights.difference(statistics.simulatedValues[i], statistics.observedValues[i]);
     sum += e;
     sumOfSquares += e * e;
   }
-  const auto n = static_cast<float>(statistics.simulatedValues.size());
-  statistics.mean = sum / n;
-  statistics.rootMeanSquare = std::sqrt(sumOfSquares / n);
-  const float v = statistics.rootMeanSquare * statistics.rootMeanSquare - statistics.mean * statistics.mean;
+  const auto n = static_cast<Number>(statistics.simulatedValues.size());
+  const Number mean = sum / n;
+  const Number rootMeanSquare = std::sqrt(sumOfSquares / n);
+  const Number v = rootMeanSquare * rootMeanSquare - mean * mean;
+  statistics.mean = mean;
+  statistics.rootMeanSquare = rootMeanSquare;
   // If v is zero, or negative by rounding, the result is v itself: deliberately not clipped.
-  statistics.standardDeviation = v > 0.0F ? std::sqrt(v) : v;
+  statistics.standardDeviation = v > 0 ? std::sqrt(v) : v;
 }
 
 /// Peak and low difference over the period, cut to the time span of the simulated series.
+template <class Number>
 void addPeakStatistics(const SeriesItem& simulation, const SeriesItem& observation, const EvaluationPeriod& period,
-                       float weight, float weightAbove, MeasureStatistics& statistics) {
+                       const Weights<Number>& weights, MeasureStatistics& statistics) {
   const std::span<const double> times = simulation.series.times();
   Period cut = periodOn(simulation.start, period);
   cut = {std::max(cut.start, times.front()), std::min(cut.end, times.back())};
@@ -153,8 +171,14 @@ void addPeakStatistics(const SeriesItem& simulation, const SeriesItem& observati
   }
   const double offset = daysSince(observation.start, simulation.start);
   const Period observedCut{cut.start + offset, cut.end + offset};
-  const auto extract = [](auto&& extractValue, const SeriesItem& item, const Period& span, std::string_view what) {
-    const std::optional<float> value = extractValue(item.series, item.item, span.start, span.end);
+  const auto extract = [](const auto& single, const auto& exact, const SeriesItem& item, const Period& span,
+                          std::string_view what) {
+    std::optional<double> value;
+    if (item.exact) {
+      value = exact(item.series.times(), *item.exact, span.start, span.end);
+    } else {
+      value = single(item.series, item.item, span.start, span.end);
+    }
     if (!value) {
       fatalError(
           fmt::format("Error extracting {} value of TS item in {}", what, item.fileName),
@@ -162,12 +186,12 @@ void addPeakStatistics(const SeriesItem& simulation, const SeriesItem& observati
     }
     return *value;
   };
-  const float observedMax = extract(extractMaxValue, observation, observedCut, "max");
-  const float simulatedMax = extract(extractMaxValue, simulation, cut, "max");
-  statistics.peakDifference = weightedDifference(simulatedMax, observedMax, weight, weightAbove);
-  const float observedMin = extract(extractMinValue, observation, observedCut, "min");
-  const float simulatedMin = extract(extractMinValue, simulation, cut, "min");
-  statistics.lowDifference = weightedDifference(simulatedMin, observedMin, weight, weightAbove);
+  const double observedMax = extract(extractMaxValue, exactMaxValue, observation, observedCut, "max");
+  const double simulatedMax = extract(extractMaxValue, exactMaxValue, simulation, cut, "max");
+  statistics.peakDifference = weights.difference(simulatedMax, observedMax);
+  const double observedMin = extract(extractMinValue, exactMinValue, observation, observedCut, "min");
+  const double simulatedMin = extract(extractMinValue, exactMinValue, simulation, cut, "min");
+  statistics.lowDifference = weights.difference(simulatedMin, observedMin);
 }
 
 }  // namespace
@@ -187,28 +211,36 @@ void requireItem(TimeSeriesObject& series, const SeriesReference& reference) {
 }
 
 MeasureStatistics computeMeasureStatistics(const OutputMeasure& measure, const EvaluationPeriod& period,
-                                           TimeSeriesObject& simulation, TimeSeriesObject& observation, float weight,
-                                           float weightAbove, bool wantPeaks) {
-  const SeriesItem simulated = readItem(simulation, measure.simulation);
-  const SeriesItem observed = readItem(observation, measure.observation);
+                                           TimeSeriesObject& simulation, TimeSeriesObject& observation, double weight,
+                                           double weightAbove, bool wantPeaks, SeriesPrecision precision) {
+  const SeriesItem simulated = readItem(simulation, measure.simulation, precision);
+  const SeriesItem observed = readItem(observation, measure.observation, precision);
   MeasureStatistics statistics = collectPairs(simulated, observed, period);
-  addDifferenceStatistics(weight, weightAbove, statistics);
-  if (wantPeaks) addPeakStatistics(simulated, observed, period, weight, weightAbove, statistics);
+  const auto add = [&](const auto& weights) {
+    addDifferenceStatistics(weights, statistics);
+    if (wantPeaks) addPeakStatistics(simulated, observed, period, weights, statistics);
+  };
+  if (precision == SeriesPrecision::exact) {
+    add(Weights<double>{weight, weightAbove});
+  } else {
+    add(Weights<float>{static_cast<float>(weight), static_cast<float>(weightAbove)});
+  }
   return statistics;
 }
 
 MeasureStatistics computeMeasureStatistics(const OutputMeasure& measure, const EvaluationPeriod& period,
-                                           TimeSeriesObject& simulation, TimeSeriesObject& observation) {
-  return computeMeasureStatistics(measure, period, simulation, observation, static_cast<float>(measure.weight),
-                                  static_cast<float>(measure.weightAbove),
-                                  statisticOf(measure.statisticType).needsPeaks);
+                                           TimeSeriesObject& simulation, TimeSeriesObject& observation,
+                                           SeriesPrecision precision) {
+  return computeMeasureStatistics(measure, period, simulation, observation, measure.weight, measure.weightAbove,
+                                  statisticOf(measure.statisticType).needsPeaks, precision);
 }
 
 bool hasPairs(const OutputMeasure& measure, const EvaluationPeriod& period, TimeSeriesObject& simulation,
               TimeSeriesObject& observation) {
   bool found = false;
-  forEachObservation(readItem(simulation, measure.simulation), readItem(observation, measure.observation), period,
-                     [&found](double, float, const std::optional<float>& simulated) {
+  forEachObservation(readItem(simulation, measure.simulation, SeriesPrecision::single),
+                     readItem(observation, measure.observation, SeriesPrecision::single), period,
+                     [&found](double, double, const std::optional<double>& simulated) {
                        found = simulated.has_value();
                        return !found;
                      });
@@ -221,8 +253,9 @@ double selectStatistic(const MeasureStatistics& statistics, StatisticType type) 
 }
 
 double measureValue(const OutputMeasure& measure, const EvaluationPeriod& period, TimeSeriesObject& simulation,
-                    TimeSeriesObject& observation) {
-  return selectStatistic(computeMeasureStatistics(measure, period, simulation, observation), measure.statisticType);
+                    TimeSeriesObject& observation, SeriesPrecision precision) {
+  return selectStatistic(computeMeasureStatistics(measure, period, simulation, observation, precision),
+                         measure.statisticType);
 }
 
 }  // namespace mirevo

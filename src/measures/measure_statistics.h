@@ -11,16 +11,17 @@
 namespace mirevo {
 
 /// The basis of the statistics of one measure: the pairs of simulated and observed values, and five statistics that are
-/// computed together, deliberately in single precision throughout.
+/// computed together: deliberately in 32 bits throughout, each number here then being one of 32 bits, or, if exact, in
+/// 64 bits throughout.
 struct MeasureStatistics {
-  float mean = 0.0F;
-  float rootMeanSquare = 0.0F;
-  float standardDeviation = 0.0F;
-  float peakDifference = 0.0F;
-  float lowDifference = 0.0F;
+  double mean = 0.0;
+  double rootMeanSquare = 0.0;
+  double standardDeviation = 0.0;
+  double peakDifference = 0.0;
+  double lowDifference = 0.0;
   std::vector<double> times;              ///< of the pairs, in days since the start of the simulated series
-  std::vector<float> simulatedValues;     ///< one per pair
-  std::vector<float> observedValues;      ///< one per pair
+  std::vector<double> simulatedValues;    ///< one per pair
+  std::vector<double> observedValues;     ///< one per pair
   std::size_t observationCount = 0;       ///< observations in the period that are not missing, whether used or not
   std::optional<DateRecord> firstUnused;  ///< time of the first observation without a simulated value
 };
@@ -34,12 +35,14 @@ void requireItem(TimeSeriesObject& series, const SeriesReference& reference);
 /// value at their time, do not count. The peak and low differences are computed only if `wantPeaks`. The two files may
 /// start at different times; equal times always match. Throws FatalError with the fixed texts.
 MeasureStatistics computeMeasureStatistics(const OutputMeasure& measure, const EvaluationPeriod& period,
-                                           TimeSeriesObject& simulation, TimeSeriesObject& observation, float weight,
-                                           float weightAbove, bool wantPeaks);
+                                           TimeSeriesObject& simulation, TimeSeriesObject& observation, double weight,
+                                           double weightAbove, bool wantPeaks,
+                                           SeriesPrecision precision = SeriesPrecision::single);
 
 /// The same with the weights of the measure, and with the peak and low differences if its statistic needs them.
 MeasureStatistics computeMeasureStatistics(const OutputMeasure& measure, const EvaluationPeriod& period,
-                                           TimeSeriesObject& simulation, TimeSeriesObject& observation);
+                                           TimeSeriesObject& simulation, TimeSeriesObject& observation,
+                                           SeriesPrecision precision = SeriesPrecision::single);
 
 /// Whether any observation in the period has a simulated value at its time, so that statistics can be computed. Throws
 /// FatalError if the series cannot be read.
@@ -51,6 +54,6 @@ double selectStatistic(const MeasureStatistics& statistics, StatisticType type);
 
 /// The value of a measure of interface type 0, as from selectStatistic().
 double measureValue(const OutputMeasure& measure, const EvaluationPeriod& period, TimeSeriesObject& simulation,
-                    TimeSeriesObject& observation);
+                    TimeSeriesObject& observation, SeriesPrecision precision = SeriesPrecision::single);
 
 }  // namespace mirevo

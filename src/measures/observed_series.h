@@ -19,9 +19,6 @@ struct ObservedSeries {
   std::vector<double> values;  ///< one per time
 };
 
-/// The values as the statistics use them, or with all digits of their file.
-enum class SeriesPrecision { single, exact };
-
 /// The period includes both ends. Throws FatalError if the item cannot be read.
 ObservedSeries readObservedSeries(std::size_t index, const OutputMeasure& measure, const EvaluationPeriod& period,
                                   SeriesPrecision precision, TimeSeriesObject& observation);

@@ -44,6 +44,9 @@ struct OutputMeasure {
   SeriesReference observation;
 };
 
+/// Values of series in 32 bits, as the statistics of a run use them, or with all digits of their file.
+enum class SeriesPrecision { single, exact };
+
 struct EvaluationPeriod {
   DateRecord start{};
   DateRecord end{};

@@ -12,7 +12,7 @@ namespace mirevo {
 namespace {
 
 /// One of the statistics that MeasureStatistics holds.
-template <float MeasureStatistics::*Figure>
+template <double MeasureStatistics::*Figure>
 double figure(const MeasureStatistics& statistics) {
   return statistics.*Figure;
 }

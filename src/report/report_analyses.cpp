@@ -153,23 +153,42 @@ std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, 
   return reported;
 }
 
-void takeObservationComposites(const std::string& filePrefix, ReportedSensitivity& sensitivity) {
+void takeSensitivities(const std::string& filePrefix, ReportedSensitivity& sensitivity) {
   std::string fault;
   const ReadTable table = readTable(runFilePath(filePrefix, run_files::kSensitivities), fault);
   const auto kind = table.column("Kind");
+  const auto output = table.column("Output");
+  const auto derivative = table.column("Derivative");
+  const auto scaled = table.column("Scaled");
   const auto composite = table.column("Composite");
-  if (!kind || !composite) return;
-  std::vector<double> found;
-  for (const std::vector<std::string>& cells : table.rows) {
-    if (cells[*kind] != "observations" || found.size() == sensitivity.parameters.size()) continue;
-    if (cells.front() != sensitivity.parameters[found.size()]) return;
-    found.push_back(realCell(cells[*composite]).value_or(std::numeric_limits<double>::quiet_NaN()));
+  if (!kind || !output || !derivative || !scaled || !composite) return;
+  ReportedSensitivity found;
+  found.parameters = sensitivity.parameters;
+  found.outputs = sensitivity.outputs;
+  auto row = table.rows.begin();
+  for (const std::string& parameter : found.parameters) {
+    std::vector<double>& derivatives = found.derivatives.emplace_back();
+    std::vector<double>& dimensionless = found.dimensionless.emplace_back();
+    // The composite of the last kind is the one that ranks: of measures, objective functions, or the observations.
+    double& ranking = found.composite.emplace_back(std::numeric_limits<double>::quiet_NaN());
+    for (; row != table.rows.end() && row->front() == parameter; ++row) {
+      const auto number = [&](std::size_t column) {
+        return realCell((*row)[column]).value_or(std::numeric_limits<double>::quiet_NaN());
+      };
+      ranking = number(*composite);
+      if ((*row)[*kind] == "observations") {
+        found.isOfObservations = true;
+        continue;
+      }
+      if (derivatives.size() == found.outputs.size() || (*row)[*output] != found.outputs[derivatives.size()]) return;
+      derivatives.push_back(number(*derivative));
+      dimensionless.push_back(number(*scaled));
+    }
+    if (derivatives.size() != found.outputs.size()) return;
   }
-  if (found.empty() || found.size() != sensitivity.parameters.size()) return;
-  sensitivity.composite = std::move(found);
-  sensitivity.isOfObservations = true;
-  sensitivity.ranking.clear();
-  for (const std::size_t i : ranked(sensitivity.composite)) sensitivity.ranking.push_back(sensitivity.parameters[i]);
+  if (row != table.rows.end()) return;
+  for (const std::size_t i : ranked(found.composite)) found.ranking.push_back(found.parameters[i]);
+  sensitivity = std::move(found);
 }
 
 std::optional<ReportedCovariance> reportedCovariance(const std::string& filePrefix, std::string& fault) {

@@ -23,15 +23,15 @@ std::string pairName(std::span<const OutputMeasure> measures, std::size_t measur
 /// cannot be read are left out.
 std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::string& filePrefix);
 
-/// The results of a local sensitivity analysis, computed from its rows and the pairs of its runs; empty without a row for the
-/// initial values.
+/// The results of a local sensitivity analysis, computed from its rows, whose statistics are of 32 bits, and the pairs
+/// of its runs; empty without a row for the initial values.
 std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, const SensitivitySettings& settings,
                                                        const SearchSpace& space, std::span<const ResultRow> rows,
                                                        const PairsByNumber& pairs);
 
-/// Takes the composites over the observations, and the ranking by them, from the tables of a finished analysis, if it
-/// has written any.
-void takeObservationComposites(const std::string& filePrefix, ReportedSensitivity& sensitivity);
+/// Takes the derivatives, which are of 64 bits, and the ranking from the table of a finished analysis, if it has
+/// written one.
+void takeSensitivities(const std::string& filePrefix, ReportedSensitivity& sensitivity);
 
 /// The covariance of the parameters that a finished sensitivity analysis has written beside its results; empty if there
 /// is none, or if its files cannot be read, with the reason in `fault`.

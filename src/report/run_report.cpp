@@ -284,7 +284,7 @@ void ReportBuilder::addAnalyses() {
                      config_.plannedEvaluations()));
   }
   if (!data_.sensitivity || !hasAnalysis) return;
-  takeObservationComposites(filePrefix_, *data_.sensitivity);
+  takeSensitivities(filePrefix_, *data_.sensitivity);
   std::string fault;
   data_.sensitivity->covariance = reportedCovariance(filePrefix_, fault);
   if (!fault.empty()) note(fmt::format("The covariance is not shown: {}.", fault));

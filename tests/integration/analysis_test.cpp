@@ -7,6 +7,7 @@
 
 #include "common/data_table.h"
 #include "integration/model_folder.h"
+#include "integration/mpi_job.h"
 #include "matchers.h"
 
 namespace mirevo::testing {
@@ -235,6 +236,78 @@ TEST(Correlation, OfMoreThanTenParametersIsATableOfItsOwnWithItsLargestEntriesIn
     EXPECT_THAT(folder.read("basin_Report.html"),
                 ::testing::ContainsRegex("\"correlation\":\\[\\],\"largestCorrelations\":\\[\\{\"first\":\"b"));
   }
+}
+
+// A step of 1e-7 changes a root mean square less than 32 bits can tell.
+TEST(LocalSensitivity, HasDerivativesOfMeasuresIn64BitsHoweverItIsRun) {
+  const ModelFolder folder;
+  std::string observed = "time,observed\n";
+  for (int day = 1; day <= 28; ++day) observed += fmt::format("2001-01-{:02},0\n", day);
+  folder.write("observed.csv", observed);
+  folder.write("model/run.sh",
+               "#!/bin/sh\nawk '/^[ab] =/ { b[++n] = $3 } END { print \"time,y\"\n"
+               "  for (t = 1; t <= 28; ++t) printf \"2001-01-%02d,%.17g\\n\", t, b[1] + b[2] * t }' "
+               "parameters.txt >simulated.csv\n",
+               0755);
+  double rms = 0.0;
+  double product = 0.0;
+  for (int t = 1; t <= 28; ++t) {
+    rms += (4.0 + t) * (4.0 + t) / 28.0;
+    product += (4.0 + t) / 28.0;
+  }
+  const double derivative = product / std::sqrt(rms);  // by a, which is 4; b is 1
+  std::string expected;
+  for (const bool isJob : {false, true}) {
+    for (const int slots : {1, 3}) {
+      if (isJob && (slots == 1 || !mpirunIsInstalled())) continue;
+      const std::string setup = folder.writeSetup({.option = 1, .slots = slots});
+      folder.editSetup("Fraction = 0.005", "Fraction = 1E-7");
+      folder.editSetup("Covmatrix = 1", "Covmatrix = 0");
+      const ProgramResult run = isJob ? startJob(3, {setup}).wait() : runProgram({setup});
+      ASSERT_EQ(run.exitCode, 0) << run.error;
+      const std::string found = folder.read("basin_Sensitivities.dat");
+      if (expected.empty()) expected = found;
+      EXPECT_EQ(found, expected) << isJob << " " << slots;
+    }
+  }
+  for (const char* kind : {"measure", "objective"}) {
+    EXPECT_NEAR(cellOf(expected, {"a", kind}, "Derivative"), derivative, 1e-7) << kind;
+  }
+  const std::string results = folder.read("basin_Sensitivity.dat");
+  const double inRows = (cellOf(results, {"3"}, "fit") - cellOf(results, {"2"}, "fit")) / 8e-7;
+  EXPECT_GT(std::abs(inRows - derivative), 0.1) << "else the test tells nothing";
+  const std::string report = folder.exists("basin_Report.html") ? folder.read("basin_Report.html") : "";
+  const std::string key = "\"derivatives\":[[";
+  if (const auto at = report.find(key); at != std::string::npos) {
+    EXPECT_NEAR(std::strtod(report.c_str() + at + key.size(), nullptr), derivative, 1e-6);
+  }
+
+  folder.editSetup("Restart = 0", "Restart = 1");
+  folder.write("basin_Sensitivity.dat", results.substr(0, results.find("\n3\t") + 1));
+  std::filesystem::remove(folder / "basin_Sensitivities.dat");
+  ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0);
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("Restart: 2 evaluations are taken from"));
+  EXPECT_EQ(folder.read("basin_Sensitivities.dat"), expected);
+}
+
+TEST(LocalSensitivity, LeavesOutAParameterOfAFewChoicesUnlessAskedFor) {
+  const ModelFolder folder;
+  const std::string setup = folder.writeSetup({.option = 1});
+  folder.editSetup("Upper_Bound = 5.0\n      Transformation_Type = 0",
+                   "Upper_Bound = 3.0\n      Transformation_Type = 2");
+  ASSERT_EQ(runProgram({setup}).exitCode, 0);
+  const std::string told =
+      "Warning: Parameter b has no derivatives: an integer of 4 values, it is a choice rather than a quantity; "
+      "Perturb_Choices = 1 in LOCAL_SA asks for its derivatives";
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr(told));
+  EXPECT_THAT(folder.read("basin_Sensitivity.dat"), HasSubstr("\n# " + told));
+  if (folder.exists("basin_Report.html")) {
+    EXPECT_THAT(folder.read("basin_Report.html"), HasSubstr(told.substr(told.find("Parameter"))));
+  }
+  EXPECT_EQ(readDataTable(folder.read("basin_Sensitivity.dat")).rows.size(), 3U);
+  folder.editSetup("[/LOCAL_SA]", "  Perturb_Choices = 1\n    [/LOCAL_SA]");
+  ASSERT_EQ(runProgram({setup}).exitCode, 0);
+  EXPECT_FALSE(std::isnan(cellOf(folder.read("basin_Sensitivities.dat"), {"b", "measure"}, "Derivative")));
 }
 
 TEST(LocalSensitivity, LeavesOutTheSecondOfTwoParametersThatActAsASumAtAnyStep) {

@@ -14,6 +14,7 @@
 #include "platform/series/csv_time_series.h"
 #include "platform/series/memory_time_series.h"
 #include "refusal.h"
+#include "temporary_folder.h"
 
 namespace mirevo {
 namespace {
@@ -76,6 +77,25 @@ TEST(MeasureStatistics, AreTheSameBitsAsEver) {
              {13.333333F, 14.1421356F, 4.714046F, 20, 10}, 2);
 }
 
+// 32 bits know neither 1e9 + 1 nor the sum of 1e8 and 1.
+TEST(MeasureStatistics, Exact) {
+  const TemporaryFolder folder;
+  folder.write("sim.csv", "time,y\n2001-01-01,1000000001\n2001-01-02,3\n2001-01-03,\n");
+  folder.write("obs.csv", "time,y\n2001-01-01,1000000000\n2001-01-02,2.5\n2001-01-03,7\n");
+  CsvTimeSeries simulation;
+  CsvTimeSeries observation;
+  ASSERT_TRUE(simulation.open(folder / "sim.csv"));
+  ASSERT_TRUE(observation.open(folder / "obs.csv"));
+  const double expected[] = {0.75, std::sqrt(0.625), 0.25, 1, 0.5};
+  for (std::size_t code = 0; code < 5; ++code) {
+    OutputMeasure m = measure(static_cast<StatisticType>(code));
+    EXPECT_NEAR(measureValue(m, kJanuary, simulation, observation, SeriesPrecision::exact), expected[code], 1e-14);
+    m.weightAbove = 0.1;
+    EXPECT_NEAR(measureValue(m, kJanuary, simulation, observation, SeriesPrecision::exact), 0.1 * expected[code],
+                1e-15);
+  }
+}
+
 TEST(MeasureStatistics, UsesTheObservationsThatCount) {
   const DateRecord first{2001, 1, 1};
   const EvaluationPeriod middle{{2001, 1, 2}, {2001, 1, 4}};
@@ -95,7 +115,7 @@ TEST(MeasureStatistics, UsesTheObservationsThatCount) {
     MemoryTimeSeries simulation = daily(simulated, start);
     MemoryTimeSeries observation = daily(observed);
     const MeasureStatistics s = computeMeasureStatistics(measure(), period, simulation, observation, 1.0F, 1.0F, false);
-    EXPECT_EQ(s.simulatedValues, used);
+    EXPECT_THAT(s.simulatedValues, ::testing::ElementsAreArray(used));
     EXPECT_EQ(s.times, times);
     EXPECT_EQ(s.peakDifference, 0.0F);
   }

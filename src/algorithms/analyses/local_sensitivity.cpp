@@ -67,6 +67,18 @@ bool fits(double step, double room) {
   return step <= room * kRounding;
 }
 
+/// Why a parameter of a few choices is left out; empty if it is none.
+std::string problemOfChoices(const SearchSpace& space, std::size_t j) {
+  if (space.transformation[j] != TransformationType::integer) return {};
+  constexpr double kRounding = 1.0e-8;
+  const double count = std::floor(space.upper[j] - space.lower[j] + kRounding);  // the upper bound is one above
+  if (count < 2.0 || count > kMostChoices) return {};
+  return fmt::format(
+      "an integer of {} values, it is a choice rather than a quantity; Perturb_Choices = 1 in LOCAL_SA asks for its "
+      "derivatives",
+      count);
+}
+
 /// Why the base set with this value of parameter j cannot be run; empty if it can.
 std::optional<std::string> violationAt(double value, std::size_t j, ParameterSet base, const Feasibility& feasibility) {
   if (!feasibility.isTested()) return std::nullopt;
@@ -129,15 +141,17 @@ ParameterDifference planDifference(const Step& step, bool central, std::size_t j
   return difference;
 }
 
+/// `valuesOf(result)` returns the outputs of an evaluation.
+template <class ValuesOf>
 SensitivityTable tabulate(const PerturbationPlan& plan, std::span<const EvaluationResult> results,
-                          std::vector<double> EvaluationResult::*values, const IncomparableOutputs& incomparable) {
+                          const IncomparableOutputs& incomparable, const ValuesOf& valuesOf) {
   std::vector<std::vector<double>> outputs;
   for (const EvaluationResult& result : results) {
-    outputs.push_back(result.ok() ? result.*values : std::vector<double>{});
+    outputs.push_back(result.ok() ? valuesOf(result) : std::vector<double>{});
   }
   SensitivityTable table;
   const EvaluationResult& base = results.front();
-  table.base = base.ok() ? base.*values : std::vector<double>((base.*values).size(), kNaN);
+  table.base = base.ok() ? outputs.front() : std::vector<double>(valuesOf(base).size(), kNaN);
   for (std::size_t k = 0; k < outputs.size(); ++k) {
     for (std::size_t i = 0; i < std::min(outputs[k].size(), incomparable[k].size()); ++i) {
       if (!incomparable[k][i].empty()) outputs[k][i] = kNaN;
@@ -313,7 +327,14 @@ const SettingSection<SensitivitySettings>& localSensitivitySection() {
         setting<&Settings::calculatesCovariance>(
             {.name = "Calculate_Covmatrix",
              .defaultValue = "0",
-             .meaning = "1: also compute the covariance and correlation matrix of the parameters."})}}};
+             .meaning = "1: also compute the covariance and correlation matrix of the parameters."}),
+        setting<&Settings::perturbsChoices>(
+            {.name = "Perturb_Choices",
+             .defaultValue = "0",
+             .meaning =
+                 fmt::format("1: integer parameters of 2 to {} values have derivatives, too. 0: they are choices "
+                             "and are left out.",
+                             kMostChoices)})}}};
   return section;
 }
 
@@ -324,6 +345,12 @@ PerturbationPlan planPerturbations(const SensitivitySettings& settings, const Se
   plan.sets.emplace_back(base.begin(), base.end());
   for (std::size_t j = 0; j < space.size(); ++j) {
     const Step step = wantedStep(settings, space, base, j);
+    if (std::string problem = settings.perturbsChoices ? "" : problemOfChoices(space, j); !problem.empty()) {
+      ParameterDifference& difference = plan.differences.emplace_back();
+      difference.extent = step.extent;
+      difference.problem = std::move(problem);
+      continue;
+    }
     const bool isCentral = settings.differencing == Differencing::central;
     plan.differences.push_back(planDifference(step, isCentral, j, feasibility, plan.sets));
     if (!plan.differences.back().problem.empty()) continue;
@@ -334,6 +361,7 @@ PerturbationPlan planPerturbations(const SensitivitySettings& settings, const Se
 
 bool hasRoomForStep(const SensitivitySettings& settings, const SearchSpace& space, std::size_t j) {
   const Step step = wantedStep(settings, space, space.initial, j);
+  if (!settings.perturbsChoices && !problemOfChoices(space, j).empty()) return true;  // left out by name
   // Bounds that leave a single value leave no parameter to perturb; it is left out by name.
   if (step.roomUp + step.roomDown == 0.0) return true;
   return fits(step.up, step.roomUp) || fits(step.down, step.roomDown);
@@ -349,9 +377,15 @@ LocalSensitivity localSensitivity(const SensitivitySettings& settings, const Sea
   noteFailures(sensitivity.plan, sensitivity.results);
   const IncomparableOutputs incomparable = incomparableMeasures(sensitivity.plan, sensitivity.results);
   sensitivity.measures =
-      tabulate(sensitivity.plan, sensitivity.results, &EvaluationResult::measureValues, incomparable);
-  sensitivity.objectives = tabulate(sensitivity.plan, sensitivity.results, &EvaluationResult::objectiveValues,
-                                    ofObjectives(incomparable, objectives));
+      tabulate(sensitivity.plan, sensitivity.results, incomparable, [](const EvaluationResult& result) {
+        return result.exactMeasures.empty() ? result.measureValues : result.exactMeasures;
+      });
+  sensitivity.objectives = tabulate(sensitivity.plan, sensitivity.results, ofObjectives(incomparable, objectives),
+                                    [&](const EvaluationResult& result) {
+                                      return result.exactMeasures.empty()
+                                                 ? result.objectiveValues
+                                                 : objectiveFunctionValues(objectives, result.exactMeasures);
+                                    });
   noteIncomparable(incomparable, sensitivity.measures, measures, sensitivity.plan);
   const bool hasObjectives = !sensitivity.objectives.base.empty();
   sensitivity.ranking = ranked(hasObjectives ? sensitivity.objectives.composite : sensitivity.measures.composite);

@@ -28,7 +28,12 @@ struct SensitivitySettings {
   PerturbationOption perturbationOption = PerturbationOption::range;
   double perturbationFraction = 0.01;
   bool calculatesCovariance = false;
+  bool perturbsChoices = false;  ///< also integer parameters of kMostChoices values or fewer
 };
+/// Up to so many values of an integer parameter are choices rather than a quantity: a step from one to the next is a
+/// quarter of the range or more, and no derivative.
+inline constexpr int kMostChoices = 5;
+
 /// The section LOCAL_SA.
 const SettingSection<SensitivitySettings>& localSensitivitySection();
 
@@ -57,7 +62,8 @@ struct PerturbationPlan {
 /// scale (a logarithmic parameter x becomes x (1 + fraction)); an integer parameter moves by whole steps, at least one.
 /// Where a step would leave the bounds the difference is one-sided, inwards; where neither side has room the step is
 /// shortened. The width of a difference is that of the values that a model reads from `fields`; without a field, any
-/// value as it is. A side that cannot be run is left out where the other one can.
+/// value as it is. A side that cannot be run is left out where the other one can. Of a parameter of a few choices there
+/// is no set unless the settings ask for it.
 PerturbationPlan planPerturbations(const SensitivitySettings& settings, const SearchSpace& space,
                                    std::span<const double> base, const ParameterFields& fields = {},
                                    const Feasibility& feasibility = {});
@@ -96,6 +102,8 @@ std::vector<std::size_t> ranked(std::span<const double> values);
 /// runs of a central difference failed, the other and the base set give a one-sided one; else a failed run leaves its
 /// parameter's derivatives out. Where one judges the model by other observations than the base set, by a measure of
 /// `measures`, the same is done for this measure and the objective functions that contain it. The plan says so.
+/// Measures are those in 64 bits where the results have them, and so are the values of `objectives`, which may be left
+/// out otherwise.
 LocalSensitivity localSensitivity(const SensitivitySettings& settings, const SearchSpace& space, Evaluator& evaluator,
                                   const ParameterFields& fields = {}, const Feasibility& feasibility = {},
                                   std::span<const ObjectiveFunction> objectives = {},

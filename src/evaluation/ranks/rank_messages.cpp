@@ -44,8 +44,9 @@ struct Layout<FailureMessage> {
 template <>
 struct Layout<EvaluationResult> {
   static void of(auto& archive, auto& result) {
-    archive(result.measureValues, result.objectiveValues, result.aggregate, result.simulatedValues, result.failure,
-            result.unusedObservations, result.pairs, result.warnings, result.shownSeries);
+    archive(result.measureValues, result.objectiveValues, result.aggregate, result.exactMeasures,
+            result.simulatedValues, result.failure, result.unusedObservations, result.pairs, result.warnings,
+            result.shownSeries);
   }
 };
 template <>

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <filesystem>
+#include <functional>
 #include <string_view>
 #include <vector>
 
@@ -68,15 +69,12 @@ std::optional<Value> interpolate(std::span<const double> times, std::span<const 
   return static_cast<Value>(before + fraction * (static_cast<double>(nextValue) - before));
 }
 
-/// The value of the item in the period that no other value precedes according to `precedes`.
-template <typename Precedes>
-std::optional<float> extractValue(const TimeSeriesObject& series, int item, double start, double end,
-                                  Precedes precedes) {
-  const std::span<const double> times = series.times();
-  const std::span<const float> values = series.values(item);
-  const std::optional<float> deleteValue = series.deleteValue();
+/// The value in the period that no other value precedes according to `precedes`.
+template <typename Value, typename Precedes>
+std::optional<Value> extractValue(std::span<const double> times, std::span<const Value> values,
+                                  std::optional<float> deleteValue, double start, double end, Precedes precedes) {
   const std::size_t count = std::min(times.size(), values.size());
-  std::optional<float> extreme;
+  std::optional<Value> extreme;
   for (std::size_t step = firstStepFrom(times, start, 0); step < count && times[step] <= end + kSameTimeDays; ++step) {
     if (isMissing(values[step], deleteValue)) continue;
     if (!extreme || precedes(values[step], *extreme)) extreme = values[step];
@@ -116,11 +114,21 @@ std::optional<float> valueAt(const TimeSeriesObject& series, int item, double da
 }
 
 std::optional<float> extractMaxValue(const TimeSeriesObject& series, int item, double start, double end) {
-  return extractValue(series, item, start, end, [](float a, float b) { return a > b; });
+  return extractValue(series.times(), series.values(item), series.deleteValue(), start, end, std::greater<>());
 }
 
 std::optional<float> extractMinValue(const TimeSeriesObject& series, int item, double start, double end) {
-  return extractValue(series, item, start, end, [](float a, float b) { return a < b; });
+  return extractValue(series.times(), series.values(item), series.deleteValue(), start, end, std::less<>());
+}
+
+std::optional<double> exactMaxValue(std::span<const double> times, std::span<const double> values, double start,
+                                    double end) {
+  return extractValue(times, values, std::nullopt, start, end, std::greater<>());
+}
+
+std::optional<double> exactMinValue(std::span<const double> times, std::span<const double> values, double start,
+                                    double end) {
+  return extractValue(times, values, std::nullopt, start, end, std::less<>());
 }
 
 }  // namespace mirevo

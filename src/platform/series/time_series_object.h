@@ -74,5 +74,10 @@ std::optional<double> exactValueAt(std::span<const double> times, std::span<cons
 /// Largest and smallest value that is not missing with start <= t <= end; empty when there is none.
 std::optional<float> extractMaxValue(const TimeSeriesObject& series, int item, double start, double end);
 std::optional<float> extractMinValue(const TimeSeriesObject& series, int item, double start, double end);
+/// The same in 64 bits for a series of `times` and `values`, in which NaN is missing.
+std::optional<double> exactMaxValue(std::span<const double> times, std::span<const double> values, double start,
+                                    double end);
+std::optional<double> exactMinValue(std::span<const double> times, std::span<const double> values, double start,
+                                    double end);
 
 }  // namespace mirevo

@@ -118,11 +118,12 @@ std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunCon
   return run;
 }
 
-std::map<int, EarlierEvaluations::Record> earlierRecords(
-    EarlierRun& run, const std::map<int, EvaluationFailure>& failures, const PairsByNumber& pairs,
-    std::optional<std::map<int, std::vector<double>>> simulatedValues) {
-  if (simulatedValues) {
-    const auto isIncomplete = [&](const ResultRow& row) { return row.ok && simulatedValues->count(row.number) == 0; };
+std::map<int, EarlierEvaluations::Record> earlierRecords(EarlierRun& run,
+                                                         const std::map<int, EvaluationFailure>& failures,
+                                                         const PairsByNumber& pairs,
+                                                         std::optional<std::map<int, KeptValues>> keptValues) {
+  if (keptValues) {
+    const auto isIncomplete = [&](const ResultRow& row) { return row.ok && keptValues->count(row.number) == 0; };
     run.rows.erase(std::remove_if(run.rows.begin(), run.rows.end(), isIncomplete), run.rows.end());
   }
   std::map<int, EarlierEvaluations::Record> records;
@@ -135,8 +136,10 @@ std::map<int, EarlierEvaluations::Record> earlierRecords(
     if (const auto found = pairs.find(row.number); found != pairs.end()) record.result.pairs = found->second;
     if (!row.ok) {
       record.result.failure = failures.at(row.number);
-    } else if (simulatedValues) {
-      record.result.simulatedValues = std::move(simulatedValues->at(row.number));
+    } else if (keptValues) {
+      KeptValues& kept = keptValues->at(row.number);
+      record.result.simulatedValues = std::move(kept.simulatedValues);
+      record.result.exactMeasures = std::move(kept.exactMeasures);
     }
   }
   return records;

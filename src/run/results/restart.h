@@ -9,6 +9,7 @@
 #include "run/results/pairs_file.h"
 #include "run/results/result_table.h"
 #include "run/results/run_record.h"
+#include "run/results/simulated_values_file.h"
 #include "run/setup/run_config.h"
 
 namespace mirevo {
@@ -42,12 +43,13 @@ struct EarlierRun {
 std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunConfig& config,
                                          const ResultColumns& columns, std::optional<RunRecord> record);
 
-/// The evaluations of an earlier run by number. `failures`: the reasons of the failed ones. `simulatedValues`: those of
-/// the others, if the task uses them; evaluations without them are left out, and therefore repeated. `pairs`: of the
+/// The evaluations of an earlier run by number. `failures`: the reasons of the failed ones. `keptValues`: those of the
+/// others, if the task uses any; evaluations without them are left out, and therefore repeated. `pairs`: of the
 /// initial run and of runs that have fewer.
-std::map<int, EarlierEvaluations::Record> earlierRecords(
-    EarlierRun& run, const std::map<int, EvaluationFailure>& failures, const PairsByNumber& pairs,
-    std::optional<std::map<int, std::vector<double>>> simulatedValues);
+std::map<int, EarlierEvaluations::Record> earlierRecords(EarlierRun& run,
+                                                         const std::map<int, EvaluationFailure>& failures,
+                                                         const PairsByNumber& pairs,
+                                                         std::optional<std::map<int, KeptValues>> keptValues);
 
 /// Writes the settings of this run. Throws FatalError.
 void writeRestartSettings(const std::string& path, const RunConfig& config);

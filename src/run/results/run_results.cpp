@@ -84,9 +84,10 @@ void RunResults::open(const RunConfig& config, std::span<const ObservedSeries> o
                       const ObjectiveAggregator& aggregator, RunLog& log) {
   if (!config.task) return;
   lockFailedRuns(log);
-  if (config.keepsSimulatedValues()) {
+  if (config.keepsSimulatedValues() || config.usesExactMeasures()) {
     const SeriesPrecision precision = config.task->keptPrecision();
-    simulatedValues_.emplace(files_.simulatedValues, simulatedValueCount(observed, precision), precision);
+    simulatedValues_.emplace(files_.simulatedValues, simulatedValueCount(observed, precision), precision,
+                             config.usesExactMeasures() ? config.measures.size() : 0);
   }
   if (earlierRun_) {
     goOn(config, aggregator, log);
@@ -201,7 +202,7 @@ void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggreg
   const FailedRunFile::Earlier earlier = failedRuns_.readEarlier(failed);
   std::map<int, EvaluationFailure> failures;
   for (const FailureRow& row : earlier.rows) failures[row.number] = row.failure;
-  std::optional<std::map<int, std::vector<double>>> values;
+  std::optional<std::map<int, KeptValues>> values;
   if (simulatedValues_) values = simulatedValues_->takeUp(succeeded);
   const std::size_t withoutValues = values ? succeeded.size() - values->size() : 0;
   PairsByNumber pairs = pairs_.readEarlier(succeeded);

@@ -32,13 +32,14 @@ Number numberAt(std::string_view bytes, std::size_t offset) {
 
 }  // namespace
 
-SimulatedValuesFile::SimulatedValuesFile(std::string path, std::size_t valueCount, SeriesPrecision precision)
-    : path_(std::move(path)), valueCount_(valueCount), precision_(precision) {}
+SimulatedValuesFile::SimulatedValuesFile(std::string path, std::size_t valueCount, SeriesPrecision precision,
+                                         std::size_t exactMeasureCount)
+    : path_(std::move(path)), valueCount_(valueCount), precision_(precision), exactMeasureCount_(exactMeasureCount) {}
 
 std::string SimulatedValuesFile::head() const {
   std::string bytes;
   appendBytes(bytes, precision_ == SeriesPrecision::exact ? kExactFormatMark : kFormatMark);
-  appendBytes(bytes, static_cast<std::uint64_t>(valueCount_));
+  appendBytes(bytes, static_cast<std::uint64_t>(recordedCount()));
   return bytes;
 }
 
@@ -47,25 +48,23 @@ void SimulatedValuesFile::create() {
   file_.append(head());
 }
 
-std::string SimulatedValuesFile::encode(int number, const std::vector<double>& values) const {
-  std::string bytes;
-  appendBytes(bytes, static_cast<std::int64_t>(number));
-  bytes.append(reinterpret_cast<const char*>(values.data()), values.size() * sizeof(double));
-  appendBytes(bytes, checksumOf(bytes));
-  return bytes;
-}
-
 void SimulatedValuesFile::add(const EvaluationResult& result) {
-  assert(result.simulatedValues.size() == valueCount_);
-  file_.append(encode(result.number, result.simulatedValues));
+  assert(result.simulatedValues.size() == valueCount_ && result.exactMeasures.size() == exactMeasureCount_);
+  std::string bytes;
+  appendBytes(bytes, static_cast<std::int64_t>(result.number));
+  for (const std::vector<double>* const values : {&result.simulatedValues, &result.exactMeasures}) {
+    bytes.append(reinterpret_cast<const char*>(values->data()), values->size() * sizeof(double));
+  }
+  appendBytes(bytes, checksumOf(bytes));
+  file_.append(bytes);
 }
 
-std::map<int, std::vector<double>> SimulatedValuesFile::takeUp(const std::set<int>& numbers) {
+std::map<int, KeptValues> SimulatedValuesFile::takeUp(const std::set<int>& numbers) {
   std::string reason;
   const std::string content = readFileIfThere(path_).value_or("");
   std::string kept = head();
-  std::map<int, std::vector<double>> found;
-  const std::size_t contentLength = sizeof(std::int64_t) + valueCount_ * sizeof(double);
+  std::map<int, KeptValues> found;
+  const std::size_t contentLength = sizeof(std::int64_t) + recordedCount() * sizeof(double);
   const std::size_t recordLength = contentLength + sizeof(std::uint64_t);
   std::string_view rest = content;
   if (!rest.starts_with(kept)) rest = {};
@@ -75,9 +74,11 @@ std::map<int, std::vector<double>> SimulatedValuesFile::takeUp(const std::set<in
     const auto number = numberAt<std::int64_t>(record, 0);
     const bool isSound = checksumOf(record.substr(0, contentLength)) == numberAt<std::uint64_t>(record, contentLength);
     if (!isSound || numbers.count(static_cast<int>(number)) == 0) continue;
-    std::vector<double> values(valueCount_);
-    if (valueCount_ > 0) {
-      std::memcpy(values.data(), record.data() + sizeof(std::int64_t), valueCount_ * sizeof(double));
+    KeptValues values{std::vector<double>(valueCount_), std::vector<double>(exactMeasureCount_)};
+    const char* from = record.data() + sizeof(std::int64_t);
+    for (std::vector<double>* const part : {&values.simulatedValues, &values.exactMeasures}) {
+      if (!part->empty()) std::memcpy(part->data(), from, part->size() * sizeof(double));
+      from += part->size() * sizeof(double);
     }
     if (found.emplace(static_cast<int>(number), std::move(values)).second) kept += record;
   }

@@ -12,21 +12,29 @@
 
 namespace mirevo {
 
-/// The simulated values at the observation times of every evaluation, for a task that uses them: the result file does
-/// not hold them, and a restarted run needs those of the evaluations that it does not repeat. Binary, one record per
-/// evaluation: its number, the values, a checksum of both. Not meant for other programs: on a machine with another
-/// number format the file counts as damaged, and the evaluations are repeated.
+/// What a task keeps of an evaluation beside its row.
+struct KeptValues {
+  std::vector<double> simulatedValues;
+  std::vector<double> exactMeasures;
+};
+
+/// The simulated values at the observation times of every evaluation, and its measures in 64 bits, for a task that uses
+/// them: the result file does not hold them, and a restarted run needs those of the evaluations that it does not
+/// repeat. Binary, one record per evaluation: its number, the values, the measures, a checksum of all. Not meant for
+/// other programs: on a machine with another number format the file counts as damaged, and the evaluations are
+/// repeated.
 class SimulatedValuesFile final {
  public:
-  /// `valueCount`: values of one evaluation.
-  SimulatedValuesFile(std::string path, std::size_t valueCount, SeriesPrecision precision = SeriesPrecision::single);
+  /// `valueCount`: simulated values of one evaluation.
+  SimulatedValuesFile(std::string path, std::size_t valueCount, SeriesPrecision precision = SeriesPrecision::single,
+                      std::size_t exactMeasureCount = 0);
 
   /// Creates the file, replacing an existing one. Throws FatalError.
   void create();
   /// Continues the file of an interrupted run: keeps the records of the evaluations with these numbers, appends to them
   /// from now on, and returns their values by number. Records that are cut off, damaged or of other evaluations are
   /// dropped, and so are all of a file of another precision. Throws FatalError when the file cannot be written.
-  std::map<int, std::vector<double>> takeUp(const std::set<int>& numbers);
+  std::map<int, KeptValues> takeUp(const std::set<int>& numbers);
 
   /// Writes the values of a successful evaluation. Throws FatalError when that fails.
   void add(const EvaluationResult& result);
@@ -37,11 +45,12 @@ class SimulatedValuesFile final {
 
  private:
   std::string head() const;
-  std::string encode(int number, const std::vector<double>& values) const;
+  std::size_t recordedCount() const { return valueCount_ + exactMeasureCount_; }
 
   std::string path_;
   std::size_t valueCount_;
   SeriesPrecision precision_;
+  std::size_t exactMeasureCount_;
   RecordFile file_;
 };
 

@@ -22,6 +22,12 @@ std::uint32_t hashOf(std::string_view text) {
 
 }  // namespace
 
+bool RunConfig::usesExactMeasures() const {
+  return task && task->usesExactMeasures() &&
+         std::any_of(measures.begin(), measures.end(),
+                     [](const OutputMeasure& measure) { return measure.interfaceType == InterfaceType::timeSeries; });
+}
+
 std::size_t RunConfig::variableParameterCount() const {
   return static_cast<std::size_t>(std::count_if(
       parameters.begin(), parameters.end(),

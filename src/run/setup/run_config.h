@@ -66,6 +66,8 @@ struct RunConfig {
   bool drawsRandomNumbers() const { return task && task->drawsRandomNumbers(); }
   /// Whether the task uses simulated values at the observation times.
   bool keepsSimulatedValues() const { return task && task->keepsSimulatedValues(); }
+  /// Whether the task uses output measures in 64 bits that differ from those in the rows.
+  bool usesExactMeasures() const;
   /// "Parameter optimisation: Dynamically Dimensioned Search"; "none" without a task.
   std::string taskDescription() const { return task ? task->description() : "none"; }
   std::size_t variableParameterCount() const;

@@ -176,9 +176,8 @@ int SensitivityTask::plannedEvaluations(std::size_t variableCount) const {
 
 TaskOutcome SensitivityTask::outcomeOf(const TaskContext& context, Evaluator& evaluator) const {
   TaskOutcome outcome{std::string(kEndOfTask)};
-  LocalSensitivity sensitivity =
-      localSensitivity(settings, context.space, evaluator, context.fields, context.feasibility, context.objectives,
-                       context.measures);
+  LocalSensitivity sensitivity = localSensitivity(settings, context.space, evaluator, context.fields,
+                                                  context.feasibility, context.objectives, context.measures);
   Linearised found;
   if (settings.calculatesCovariance) found = linearised(context, sensitivity);
   if (found.model) takeObservations(*found.model, sensitivity);

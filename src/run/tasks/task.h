@@ -132,6 +132,8 @@ class Task {
   /// Whether it uses the simulated values at the observation times, which the results then must hold.
   virtual bool keepsSimulatedValues() const { return false; }
   virtual SeriesPrecision keptPrecision() const { return SeriesPrecision::single; }
+  /// Whether it uses the output measures in 64 bits, which the results then must hold.
+  virtual bool usesExactMeasures() const { return false; }
   /// Empty if its batches fill several slots.
   virtual std::optional<OneSlotOnly> needsOneSlot() const { return std::nullopt; }
 

@@ -65,7 +65,10 @@ TEST(PlanPerturbations, TakesItsStepsInsideTheBounds) {
       {"integer, at least one", {kInteger, 5, 0, 11}, {kCentral, kOfRange, 0.01}, 4, 6},
       {"integer, rounded", {kInteger, 5, 0, 11}, {kCentral, kOfRange, 0.26}, 2, 8},
       {"integer at its largest value", {kInteger, 10, 0, 11}, {kForward, kOfRange, 0.01}, 9, 10},
-      {"integer, two steps to the bound", {kInteger, 1.3, 0.3, 4.3}, {kForward, kOfRange, 0.6}, 1.3, 3.3},
+      {"integer, two steps to the bound", {kInteger, 1.3, 0.3, 4.3}, {kForward, kOfRange, 0.6, false, true}, 1.3, 3.3},
+      {"integer of five values", {kInteger, 2, 1, 6}, {kForward, kOfRange, 0.01}, 2, 2},
+      {"integer of five values, asked for", {kInteger, 2, 1, 6}, {kForward, kOfRange, 0.01, false, true}, 2, 3},
+      {"integer of six values", {kInteger, 2, 1, 7}, {kForward, kOfRange, 0.01}, 2, 3},
       {"integer of one value", {kInteger, 4, 4, 5}, {kForward, kOfRange, 0.01}, 4, 4},
   };
   for (const auto& [what, parameter, settings, minus, plus] : cases) {

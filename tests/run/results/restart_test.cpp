@@ -195,10 +195,14 @@ TEST(SimulatedValuesFile, KeepsWholeRecordsOfTheEvaluationsThatCount) {
   const auto add = [](SimulatedValuesFile& file, int number) {
     EvaluationResult result;
     result.number = number;
-    result.simulatedValues = {0.1 * number, std::nan("")};
+    result.simulatedValues = {0.1 * number};
+    result.exactMeasures = {-1.0 * number};
     file.add(result);
   };
-  SimulatedValuesFile file(folder / "v.bin", 2);
+  const auto fileOf = [&](SeriesPrecision precision = SeriesPrecision::single) {
+    return SimulatedValuesFile(folder / "v.bin", 1, precision, 1);
+  };
+  SimulatedValuesFile file = fileOf();
   file.create();
   for (const int number : {3, 1, 2}) add(file, number);
   const std::string whole = folder.read("v.bin");
@@ -207,22 +211,24 @@ TEST(SimulatedValuesFile, KeepsWholeRecordsOfTheEvaluationsThatCount) {
   ASSERT_EQ(whole.size(), kHead + 3 * kRecord);
   for (std::size_t length = 0; length <= whole.size(); ++length) {
     folder.write("v.bin", whole.substr(0, length));
-    SimulatedValuesFile cut(folder / "v.bin", 2);
+    SimulatedValuesFile cut = fileOf();
     const auto found = cut.takeUp({1, 3});
     const std::size_t records = length < kHead ? 0 : (length - kHead) / kRecord;
     ASSERT_EQ(found.size(), std::min<std::size_t>(records, 2)) << length;
-    for (const auto& [number, values] : found) EXPECT_EQ(values[0], 0.1 * number);
+    for (const auto& [number, values] : found) {
+      EXPECT_THAT(values.simulatedValues, ElementsAre(0.1 * number));
+      EXPECT_THAT(values.exactMeasures, ElementsAre(-1.0 * number));
+    }
     add(cut, 2);
     EXPECT_EQ(folder.read("v.bin").size(), kHead + (found.size() + 1) * kRecord);
   }
   std::string damaged = whole;
   damaged[kHead + kRecord + 10] ^= 1;
   folder.write("v.bin", damaged);
-  EXPECT_THAT(SimulatedValuesFile(folder / "v.bin", 2).takeUp({1, 2, 3}),
-              ElementsAre(testing::Key(2), testing::Key(3)));
+  EXPECT_THAT(fileOf().takeUp({1, 2, 3}), ElementsAre(testing::Key(2), testing::Key(3)));
   EXPECT_THAT(SimulatedValuesFile(folder / "v.bin", 3).takeUp({1, 2, 3}), IsEmpty()) << "of other series";
   folder.write("v.bin", whole);
-  EXPECT_THAT(SimulatedValuesFile(folder / "v.bin", 2, SeriesPrecision::exact).takeUp({1, 2, 3}), IsEmpty());
+  EXPECT_THAT(fileOf(SeriesPrecision::exact).takeUp({1, 2, 3}), IsEmpty());
 }
 
 TEST(FailedRunFile, IsContinuedWithTheFailuresThatCount) {
