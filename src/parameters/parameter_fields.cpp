@@ -1,9 +1,11 @@
 #include "parameters/parameter_fields.h"
 
+#include <limits>
 #include <utility>
 #include <variant>
 
 #include "common/text.h"
+#include "parameters/value_format.h"
 
 namespace mirevo {
 
@@ -27,6 +29,21 @@ ParameterFields parameterFields(ParameterModel& model, std::span<const int> widt
     return values;
   };
   return fields;
+}
+
+std::vector<double> valuesAsWritten(const ParameterFields& fields, const SearchSpace& space,
+                                    std::span<const double> set) {
+  std::vector<double> written;
+  const auto add = [&written](double value, int width) {
+    if (width > 0) written.push_back(valueAsWritten(value, width).value_or(std::numeric_limits<double>::infinity()));
+  };
+  const std::vector<double> values = ToModelScale(space, set);
+  for (std::size_t j = 0; j < values.size(); ++j) add(values[j], fields.widthOf(j));
+  if (fields.dependentValues) {
+    const std::vector<double> ofDependents = fields.dependentValues(set);
+    for (std::size_t i = 0; i < ofDependents.size(); ++i) add(ofDependents[i], fields.dependents[i].width);
+  }
+  return written.empty() ? values : written;
 }
 
 }  // namespace mirevo

@@ -25,6 +25,11 @@ struct ParameterFields {
   int widthOf(std::size_t variable) const { return variable < widths.size() ? widths[variable] : 0; }
 };
 
+/// What the model reads of a set (search scale): the values in all fields as they are written there, infinite where a
+/// field holds no number; of a model without fields, the values themselves.
+std::vector<double> valuesAsWritten(const ParameterFields& fields, const SearchSpace& space,
+                                    std::span<const double> set);
+
 /// The fields of the model's parameters, by `widths` of one entry per parameter of any type. The model must outlive
 /// them.
 ParameterFields parameterFields(ParameterModel& model, std::span<const int> widths);

@@ -298,6 +298,7 @@ TaskContext RunDriver::taskContext() {
           filePrefix_,
           runner_->observedSeries(),
           parameterFields(*parameters_, widestPlaceholders(runner_->templates(), config_.parameters.size())),
+          [this](std::span<const double> values) { return aggregator_->aggregate(values); },
           parameters_->feasibility(),
           [this](std::string_view text) { warn(text); }};
 }

@@ -35,8 +35,9 @@ std::string ComparedObservations::differenceText(std::size_t one, std::size_t ot
                                                  const std::string& otherName) const {
   const std::size_t count = pairsOf(one, measure)->count;
   const std::size_t otherCount = pairsOf(other, measure)->count;
-  return fmt::format("evaluation {} has {} pairs of simulated and observed values, {} {}", results_[one].number, count,
-                     otherName, count == otherCount ? "as many, of other observations" : std::to_string(otherCount));
+  return fmt::format("evaluation {} has {} {} of simulated and observed values, {} {}", results_[one].number, count,
+                     count == 1 ? "pair" : "pairs", otherName,
+                     count == otherCount ? "as many, of other observations" : std::to_string(otherCount));
 }
 
 IncomparableOutputs ofObjectives(const IncomparableOutputs& ofMeasures, std::span<const ObjectiveFunction> objectives) {

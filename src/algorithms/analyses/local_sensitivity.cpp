@@ -266,7 +266,7 @@ double quotient(const ParameterDifference& difference, double below, double base
 
 /// The warning of perturbed runs that fit better than the base set; empty where there is none.
 std::string betterFitText(std::span<const EvaluationResult> results) {
-  constexpr double kRounding = 1.0 - 1.0e-6;  // of the statistics, in 32 bits
+  constexpr double kRounding = 1.0 - 1.0e-6;  // of the values that the model writes
   const EvaluationResult& base = results.front();
   const EvaluationResult* best = nullptr;
   std::size_t count = 0;

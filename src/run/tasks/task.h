@@ -62,6 +62,8 @@ struct TaskContext {
   /// The observations whose simulated values the results hold; needed if the task keepsSimulatedValues().
   std::span<const ObservedSeries> observedSeries = {};
   ParameterFields fields = {};
+  /// The aggregate of the objective functions' values. May be empty.
+  std::function<double(std::span<const double> objectiveValues)> aggregate = {};
   Feasibility feasibility = {};  ///< which sets can be run, of a model with constraints
   /// Shows the user a warning that the log receives as well. May be empty.
   std::function<void(std::string_view)> warnUser = {};
