@@ -211,7 +211,7 @@ std::optional<ReportedCovariance> reportedCovariance(const std::string& filePref
   found.correlationFile = fileNameOf(correlationFile);
   for (const std::vector<std::string>& cells : limits.rows) {
     if (!cells[*leftOut].empty()) {
-      found.leftOut.push_back(cells.front());
+      found.leftOut.push_back({cells.front(), cells[*leftOut]});
       continue;
     }
     const std::vector<double> numbers = numbersOf(cells, 1);
