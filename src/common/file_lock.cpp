@@ -23,8 +23,6 @@
 namespace mirevo {
 namespace {
 
-constexpr unsigned kPauseMicroseconds = 50'000;
-
 /// The locks held, for signal handlers. A program holds few; one that is not in here only leaves its file behind.
 std::array<std::atomic<const FileLock*>, 8> heldLocks;
 
@@ -64,17 +62,6 @@ int bindSocket(const std::string& path, int number) {
   return made.giveAway();
 }
 
-/// " (process 1234 on node07)" from the content of a lock's file.
-std::string holderIn(const std::string& path) {
-  const Descriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
-  std::array<char, 200> text{};
-  const ssize_t length = file.get() < 0 ? 0 : ::pread(file.get(), text.data(), text.size(), 0);
-  if (length <= 0) return {};
-  const std::string_view read(text.data(), static_cast<std::size_t>(length));
-  const std::size_t end = read.find('\n');
-  return end == std::string_view::npos ? std::string() : fmt::format(" ({})", read.substr(0, end));
-}
-
 }  // namespace
 
 bool FileLock::take(const std::string& path, Range range, double patienceSeconds) {
@@ -96,9 +83,9 @@ bool FileLock::take(const std::string& path, Range range, double patienceSeconds
       return true;
     }
     if (isLast) break;
-    ::usleep(kPauseMicroseconds);
+    ::usleep(kLockPauseMicroseconds);
   }
-  holder_ = holderIn(path_);
+  holder_ = holderOf(path_);
   path_.clear();
   return false;
 }
@@ -130,7 +117,7 @@ bool FileLock::takeSocket(Range range, int error, double deadline) {
       path_.clear();
       return false;
     }
-    ::usleep(kPauseMicroseconds);
+    ::usleep(kLockPauseMicroseconds);
   }
   warning_ = fmt::format("{} cannot be locked: {}. Another run that works on the same files {}", path_,
                          std::strerror(error), socket_ < 0 ? "is not noticed" : "is noticed on this machine only");
@@ -182,6 +169,16 @@ void FileLock::release() {
     if (*descriptor >= 0) ::close(std::exchange(*descriptor, -1));
   }
   path_.clear();
+}
+
+std::string FileLock::holderOf(const std::string& path) {
+  const Descriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
+  std::array<char, 200> text{};
+  const ssize_t length = file.get() < 0 ? 0 : ::pread(file.get(), text.data(), text.size(), 0);
+  if (length <= 0) return {};
+  const std::string_view read(text.data(), static_cast<std::size_t>(length));
+  const std::size_t end = read.find('\n');
+  return end == std::string_view::npos ? std::string() : fmt::format(" ({})", read.substr(0, end));
 }
 
 bool FileLock::isHeld(const std::string& path) {

@@ -28,7 +28,7 @@ class FileLock final {
   bool take(const std::string& path, Range range, double patienceSeconds);
   void release();
 
-  /// After take() has returned false: " (process 1234 on node07)", as far as that is known.
+  /// holderOf() the lock after take() has returned false.
   const std::string& holder() const { return holder_; }
   /// After it has returned true: the file, why it could not be locked, and what follows from that; else empty.
   const std::string& warning() const { return warning_; }
@@ -36,6 +36,9 @@ class FileLock final {
   /// Whether any of the file is locked by another object of this class, in any program. Does not disturb a program that
   /// is taking the lock.
   static bool isHeld(const std::string& path);
+
+  /// " (process 1234 on node07)", from the file of a lock that is held; empty where it does not say.
+  static std::string holderOf(const std::string& path);
 
   /// For signal handlers that end the program: removes the files of all locks held. Async-signal-safe.
   static void removeFilesFromSignal() noexcept;
@@ -57,5 +60,7 @@ class FileLock final {
 
 /// Longest wait for a run that is just ending.
 inline constexpr double kLockPatienceSeconds = 3.0;
+/// Between two looks at a lock that is held.
+inline constexpr unsigned kLockPauseMicroseconds = 50'000;
 
 }  // namespace mirevo

@@ -1,6 +1,7 @@
 #include "common/replaceable_files.h"
 
 #include <algorithm>
+#include <array>
 #include <filesystem>
 #include <optional>
 #include <string_view>
@@ -20,16 +21,29 @@ constexpr std::string_view kReportHead =
     "<!doctype html>\n<html lang=\"en\">\n<head>\n<meta charset=\"utf-8\">\n<meta "
     "http-equiv=\"Content-Security-Policy\" content=\"default-src 'none'; script-src";
 
+bool isTerminationLog(std::string_view text) {
+  return text.size() < 200 && (text.ends_with("Successful completion\n") || text.ends_with("Abnormal completion\n"));
+}
+
 /// Of a file that a full disk or a kill has cut off before the end of its mark.
 bool isPartOfHead(std::string_view text, const RunFile& file) {
   using namespace run_files;
-  if (file == kLog && kLog.mark.starts_with(text)) return true;
   if (file == kReport) return kReportHead.starts_with(text);
-  constexpr std::string_view kSimulatedMark = kPlain.simulatedValues.mark;
-  if (file.mark == kSimulatedMark) return text.empty() || kSimulatedMark.starts_with(text.substr(1));  // the version
+  if (text.empty() || file.mark.starts_with(text)) return true;
+  if (file.mark == kPlain.simulatedValues.mark) return file.mark.starts_with(text.substr(1));  // behind the version
+  // Before the mark of a table is the line of the title, which may be any.
+  if (file.mark != RunFile{}.mark || !text.starts_with("#") || text.size() >= kFileHeadLength) return false;
   const auto lines = splitLines(text);
-  return text.size() < kFileHeadLength &&
-         std::all_of(lines.begin(), lines.end(), [](std::string_view line) { return line.starts_with("#"); });
+  return lines.size() == 1 || (lines.size() == 2 && file.mark.starts_with(lines[1]));
+}
+
+/// Of any run: a setup that is named after a result of another shares names with it.
+bool isOfSomeRun(std::string_view head, const RunFile& file) {
+  using namespace run_files;
+  if (file == kLog && isTerminationLog(head)) return true;
+  const std::array marks{file.mark, RunFile{}.mark, kPlain.restart.mark, kFailuresMark};
+  return std::any_of(marks.begin(), marks.end(),
+                     [head](std::string_view mark) { return head.find(mark) != head.npos; });
 }
 
 /// Whether a run has made the folder.
@@ -104,7 +118,7 @@ std::string whyNotReplaceable(const std::string& path, const RunFile& file) {
     std::string reason;
     const auto head = readFileHead(path, reason);
     if (!head) return unreadable(reason);
-    isOfRun = !isFolder && (head->find(file.mark) != std::string::npos || isPartOfHead(*head, file));
+    isOfRun = !isFolder && (isOfSomeRun(*head, file) || isPartOfHead(*head, file));
   }
   return isOfRun ? std::string() : std::string(kOfAnother);
 }

@@ -25,6 +25,7 @@
 #include "report/report_file.h"
 #include "report/report_parameters.h"
 #include "report/run_sources.h"
+#include "run/results/shared_files.h"
 #include "run/setup/setup_summary.h"
 
 namespace mirevo {
@@ -85,6 +86,9 @@ ReportData ReportBuilder::build() {
   data_.periodFirst = secondNumber(config_.period.start);
   data_.periodLast = secondNumber(config_.period.end);
   addRun();
+  if (!sources_.setup.empty() && !isSameSetup(sources_.setup, config_.setupFile)) {
+    note(fmt::format("The results name another setup, {}.", sources_.setup));
+  }
   if (!sources_.recordFault.empty()) {
     note(fmt::format("How the run ended is taken from its results alone: {}.", sources_.recordFault));
   }

@@ -12,6 +12,7 @@
 #include "common/file_lock.h"
 #include "common/files.h"
 #include "common/run_files.h"
+#include "run/results/shared_files.h"
 
 namespace mirevo {
 namespace {
@@ -62,6 +63,7 @@ std::optional<RunSources> readRunSources(const RunConfig& config, const SearchSp
     return std::nullopt;
   }
   RunSources sources;
+  sources.setup = setupNamedIn(*text);
   sources.results = readResultTable(*text, resultColumns(config, space));
   putInOrder(sources.results.rows);
   auto record = readRecord(runFilePath(filePrefix, names->record), sources.recordFault);

@@ -1,6 +1,7 @@
 #include "run/run_driver.h"
 
 #include <algorithm>
+#include <array>
 #include <filesystem>
 #include <new>
 #include <unistd.h>
@@ -10,6 +11,7 @@
 #include "common/calendar.h"
 #include "common/clock.h"
 #include "common/fatal_error.h"
+#include "common/file_lock.h"
 #include "common/files.h"
 #include "common/progress_messages.h"
 #include "common/replaceable_files.h"
@@ -47,12 +49,20 @@ std::string environmentValue(const char* name) {
 
 constexpr std::string_view kAnotherRun = "Error: Another run of this setup is in progress";
 
-/// Because of a run of `shorter`, whose files begin as those of `longer`, or the other way round.
-[[noreturn]] void failAsShared(const std::string& shorter, const std::string& longer, const std::string& holder) {
-  fatalError(kAnotherRun,
-             fmt::format("{0}.kdx and {1}.kdx have result files in common, {1}*, and a run{2} of one of them is going "
-                         "on. Wait for it, or run a copy under another name.",
-                         shorter, longer, holder));
+/// Runs that share a file by the names of their setups must not be going on at the same time. Of two that begin
+/// together the one with the shorter name waits longer, so that not both give up.
+void awaitRunsThatShare(const std::string& setupFile, const std::string& prefix) {
+  const double start = runTimeClock();
+  for (std::string other; !(other = runningPrefixThatShares(prefix)).empty();) {
+    const bool isShorter = prefix.size() < other.size();
+    if (runTimeClock() - start >= (isShorter ? 2.0 : 1.0) * kLockPatienceSeconds) {
+      fatalError(kAnotherRun, fmt::format("{}: a run{} of {}.kdx, which has results with the same names, {}*. Wait for "
+                                          "it, or run a copy under another name.",
+                                          setupFile, FileLock::holderOf(runFilePath(other, run_files::kRunLock)), other,
+                                          isShorter ? other : prefix));
+    }
+    ::usleep(kLockPauseMicroseconds);
+  }
 }
 
 }  // namespace
@@ -113,12 +123,11 @@ void RunDriver::openRun(const std::string& setupFileName) {
     fatalError("Error: Unable to open " + setup.file, fmt::format("{}; did you mean {}?", fault, meant));
   }
   if (!runLock_.take(runFilePath(filePrefix_, run_files::kRunLock), {}, kLockPatienceSeconds)) {
-    const std::string sharing = runningPrefixThatShares(filePrefix_);
-    if (!sharing.empty()) failAsShared(sharing, filePrefix_, runLock_.holder());
     fatalError(kAnotherRun,
                fmt::format("{}: another run{} writes the files {}*. Wait for it, or run a copy under another name.",
                            setup.file, runLock_.holder(), filePrefix_));
   }
+  awaitRunsThatShare(setup.file, filePrefix_);
   const std::string logFile = runFilePath(filePrefix_, run_files::kLog);
   requireReplaceable(logFile, run_files::kLog);
   const std::string keptLog = RunLog::isOfRefusedSetup(logFile) ? std::string() : keepEarlierFile(logFile);
@@ -150,18 +159,6 @@ void RunDriver::warn(std::string_view text) {
   showMessage(text, {}, MessageType::warning);
 }
 
-/// Where another setup of the folder is named after a result of this run, both would write that file.
-void RunDriver::lockSharedFiles() {
-  if (!config_.task) return;
-  for (const std::string& other : prefixesThatShare(filePrefix_, RunResults::dataFiles(config_))) {
-    FileLock& lock = sharedLocks_.emplace_back();
-    if (!lock.take(runFilePath(other, run_files::kRunLock), {}, kLockPatienceSeconds)) {
-      failAsShared(filePrefix_, other, lock.holder());
-    }
-    if (!lock.warning().empty()) warn(lock.warning());
-  }
-}
-
 /// The workers lock the process folders, each its own, on the machine where that is. The master, which begins earlier,
 /// finds out whether another run works in any of them and whether they can be locked.
 void RunDriver::lockProcessFoldersOfJob(const std::string& prefix) {
@@ -179,7 +176,6 @@ void RunDriver::buildModel() {
   parameters_ = std::make_unique<ParameterModel>(config_.parameters, config_.constraints);
   aggregator_ = std::make_unique<ObjectiveAggregator>(config_.objectives, config_.aggregationMethod);
   // Before the process folders are made, so that a run that cannot be continued changes nothing.
-  lockSharedFiles();
   results_.emplace(config_, parameters_->searchSpace(), filePrefix_);
   results_->requireReplaceableFiles(config_);
   if (config_.task) config_.task->continueFrom(results_->earlierSearches());
@@ -255,7 +251,7 @@ void RunDriver::putEarlierReportAside() {
 void RunDriver::openSeries() {
   const std::string path = runFilePath(filePrefix_, run_files::kSeries);
   const bool goesOn = results_->earlierEvaluations() != nullptr;
-  if (!goesOn) keepEarlierResults(path, config_.setupFile, state_.log);
+  if (!goesOn) keepEarlierResults(std::array{path}, config_.setupFile, state_.log);
   if (runner_->shownMeasures().empty()) return;
   RecordedSeries run;
   run.headLines = {

@@ -1,6 +1,5 @@
 #pragma once
 
-#include <list>
 #include <memory>
 #include <optional>
 #include <span>
@@ -54,7 +53,6 @@ class RunDriver final {
   void startJob();
   void openRun(const std::string& setupFileName);
   void warn(std::string_view text);
-  void lockSharedFiles();
   void lockProcessFoldersOfJob(const std::string& prefix);
   void buildModel();
   void logSetup();
@@ -88,12 +86,11 @@ class RunDriver final {
   std::vector<std::string> closingLines(const Ending& ending) const;
 
   RunState state_;
-  FileLock runLock_;                 ///< on the files with the setup's name
-  std::list<FileLock> sharedLocks_;  ///< those of other setups whose runs may write files of this run
-  FileLock processLock_;             ///< the master's, on the process folders of the job
-  bool isAccepted_ = false;          ///< the setup: from now on files of earlier runs are touched
-  std::string filePrefix_;  ///< folder and name of the setup, without ".kdx": the beginning of the paths of the run's
-                            ///< files
+  FileLock runLock_;         ///< on the files with the setup's name
+  FileLock processLock_;     ///< the master's, on the process folders of the job
+  bool isAccepted_ = false;  ///< the setup: from now on files of earlier runs are touched
+  std::string filePrefix_;   ///< folder and name of the setup, without ".kdx": the beginning of the paths of the run's
+                             ///< files
   RunConfig config_;
   std::unique_ptr<ParameterModel> parameters_;
   std::unique_ptr<ObjectiveAggregator> aggregator_;

@@ -7,8 +7,11 @@
 
 #include <fmt/core.h>
 
+#include "common/replaceable_files.h"
+#include "common/run_files.h"
 #include "platform/signals/signal_state.h"
 #include "platform/terminal/front_end.h"
+#include "run/results/record_file.h"
 #include "run/signal_handlers.h"
 
 namespace mirevo {
@@ -19,6 +22,7 @@ void setTerminationLogUnit(int unit) {
 
 std::string openTerminationLog(const std::string& path) {
   if (signalState.terminationLogUnit > 0) return {};
+  if (carriesMark(path, run_files::kLog)) keepEarlierFile(path);  // the log of a setup `basin_Termination.kdx`
   // Removed rather than emptied: an earlier run that is just ending then writes its last line to its own file.
   ::unlink(path.c_str());
   const int unit = ::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_APPEND | O_CLOEXEC, 0666);

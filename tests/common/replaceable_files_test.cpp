@@ -22,7 +22,7 @@ TEST(ReplaceableFiles, CutOffAtAnyByteAreARunsAndOthersAreNot) {
       const std::string path = folder.write("x", whole.substr(0, length));
       EXPECT_EQ(whyNotReplaceable(path, file), "") << whole.substr(0, length);
     }
-    for (const char* other : {"my", "<!doctype html>\n<html>", "1.5 2.5\n", "Mirror"}) {
+    for (const char* other : {"my", "<!doctype html>\n<html>", "1.5 2.5\n", "Mirror", "# my\n# own\n"}) {
       EXPECT_NE(whyNotReplaceable(folder.write("x", other), file), "") << other;
     }
   }

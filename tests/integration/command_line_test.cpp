@@ -133,5 +133,25 @@ TEST(Results, WhatIsNotOfARunIsNeitherRenamedNorRemoved) {
   for (const char* name : {"basin_Failed7/notes.txt", "another.dat"}) EXPECT_EQ(folder.read(name), "the user's");
 }
 
+TEST(Results, OfSetupsNamedAfterAResultOfAnotherAreNotLost) {
+  const ModelFolder folder;
+  folder.writeSetup({.option = 0});
+  const std::string other = folder.read("basin.kdx");
+  folder.writeSetup({.option = 0, .restart = 1});
+  for (const char* name : {"basin", "basin_Run", "basin_Termination", "basin_Restart", "calSimErr", "basin_Run"}) {
+    if (std::string_view(name) != "basin") folder.write(name + std::string(".kdx"), other);
+    const ProgramResult run = runProgram({folder / name + ".kdx"});
+    EXPECT_EQ(run.exitCode, 0) << name << run.error;
+  }
+  EXPECT_THAT(folder.read("basin_Run.1.dat"), HasSubstr("plannedEvaluations"));  // the account, and the results twice
+  EXPECT_THAT(folder.read("basin_Run.2.dat"), HasSubstr("\n1\tOK\t"));
+  EXPECT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 1);  // its settings are those of basin_Restart.kdx no more
+  std::filesystem::rename(folder / "basin_Restart.1.dat", folder / "basin_Restart.dat");
+  const ProgramResult run = runProgram({folder / "basin.kdx"});
+  EXPECT_THAT(run.error, HasSubstr("Results of another setup, " + folder / "basin_Run.kdx"));
+  EXPECT_THAT(folder.read("basin_Run.3.dat"), HasSubstr("\n1\tOK\t"));
+  EXPECT_THAT(folder.read("basin_Termination.2.log"), HasSubstr("Normal termination"));
+}
+
 }  // namespace
 }  // namespace mirevo::testing

@@ -1,3 +1,5 @@
+#include <regex>
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -55,15 +57,18 @@ TEST_F(Interruption, ASecondRunOfTheSameFilesOrFoldersIsRefused) {
   const std::string log = folder_.read("basin.log");
   folder_.write("new", folder_.read("basin.kdx"));  // as an editor saves
   std::filesystem::rename(folder_ / "new", setup_);
-  folder_.write("basin.KDX", folder_.read("basin.kdx"));
-  for (const std::string& setup : {setup_, folder_ / "basin.KDX"}) {
-    const ProgramResult second = runProgram({setup});
+  for (const auto& [setup, reason] : {std::pair{"basin.kdx", "another run HOLDER writes the files"},
+                                      {"basin.KDX", "another run HOLDER writes the files"},
+                                      {"basin_Run.kdx", "a run HOLDER of .*/basin.kdx, which has results with the"}}) {
+    folder_.write(setup, folder_.read("basin.kdx"));
+    const ProgramResult second = runProgram({folder_ / setup});
     EXPECT_EQ(second.exitCode, 1);
-    EXPECT_THAT(second.error, ::testing::ContainsRegex("Error: Another run of this setup is in progress\n.*/basin.* "
-                                                       "another run \\(process [0-9]+ on [^)]*\\) writes the files"));
+    const std::string pattern =
+        std::regex_replace(std::string(reason), std::regex("HOLDER"), "\\(process [0-9]+ on [^)]*\\)");
+    EXPECT_THAT(second.error, ::testing::ContainsRegex("Another run of this setup is in progress\n.*: " + pattern));
   }
   EXPECT_EQ(folder_.read("basin.log"), log);
-  EXPECT_FALSE(folder_.exists("basin.1.log"));
+  for (const char* file : {"basin.1.log", "basin_Run.log"}) EXPECT_FALSE(folder_.exists(file));
 
   // Another setup whose process folders have the same names.
   const std::string first = folder_ / folder_.processFolder("other", 1);

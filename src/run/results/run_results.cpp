@@ -105,18 +105,18 @@ std::vector<std::string> RunResults::bandPaths(const RunConfig& config) const {
   return paths;
 }
 
-std::vector<RunFile> RunResults::dataFiles(const RunConfig& config) {
-  const ResultFileNames& names = namesOf(config);
-  std::vector<RunFile> files{names.results,  names.restart, names.simulatedValues, names.record,
-                             names.failures, names.pairs,   run_files::kSeries};
-  files.insert(files.end(), names.tables.begin(), names.tables.end());
-  return files;
+std::vector<std::string> RunResults::pathsBesideResults() const {
+  std::vector<std::string> paths{files_.record, files_.failures, files_.pairs};
+  for (const RunFile& table : names_.tables) paths.push_back(runFilePath(filePrefix_, table));
+  return paths;
 }
 
 void RunResults::requireReplaceableFiles(const RunConfig& config) const {
   if (!config.task) return;
-  std::vector<RunFile> files = dataFiles(config);
-  files.insert(files.end(), {run_files::kReport, run_files::kSavedFolder, run_files::kOwnFailedRuns});
+  std::vector<RunFile> files{
+      names_.results, names_.restart,     names_.simulatedValues, names_.record,           names_.failures,
+      names_.pairs,   run_files::kSeries, run_files::kReport,     run_files::kSavedFolder, run_files::kOwnFailedRuns};
+  files.insert(files.end(), names_.tables.begin(), names_.tables.end());
   for (const RunFile& file : files) requireReplaceable(runFilePath(filePrefix_, file), file);
   requireReplaceable(pathBeside(filePrefix_, run_files::kFailedRuns), run_files::kFailedRuns);
   for (const std::string& path : bandPaths(config)) requireReplaceable(path, run_files::kBand);
@@ -155,15 +155,10 @@ void RunResults::writeTables(std::span<const DataTable> tables) const {
 
 void RunResults::keepEarlierFiles(const RunConfig& config, RunLog& log) const {
   keepEarlierFile(failedRuns_.paths().forPeople);
-  if (const std::string kept = keepEarlierResults(files_.results, config.setupFile, log); !kept.empty()) {
+  std::vector<std::string> paths{files_.results, files_.settings, files_.simulatedValues};
+  for (std::string& path : pathsBesideResults()) paths.push_back(std::move(path));
+  if (const std::string kept = keepEarlierResults(paths, config.setupFile, log).front(); !kept.empty()) {
     log.line("The results of the earlier run were kept as " + kept);
-  }
-  for (const std::string& path :
-       {files_.settings, files_.simulatedValues, files_.record, files_.failures, files_.pairs}) {
-    keepEarlierResults(path, config.setupFile, log);
-  }
-  for (const RunFile& table : names_.tables) {
-    keepEarlierResults(runFilePath(filePrefix_, table), config.setupFile, log);
   }
   if (const std::string kept = keepEarlierFile(runFilePath(filePrefix_, run_files::kSavedFolder)); !kept.empty()) {
     log.line("The saved output files of the earlier run were kept as " + kept);
@@ -191,6 +186,7 @@ void RunResults::removeStatistics(const RunConfig& config) const {
 
 void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggregator, RunLog& log) {
   EarlierRun run = *std::exchange(earlierRun_, std::nullopt);
+  keepResultsOfAnother(files_.results, pathsBesideResults(), config.setupFile, log);
   if (earlierRunHasStatistics_) removeStatistics(config);
   std::map<int, std::vector<double>> failedSets;
   std::set<int> failed;

@@ -40,9 +40,6 @@ class RunResults final {
   void open(const RunConfig& config, std::span<const ObservedSeries> observed, const ObjectiveAggregator& aggregator,
             RunLog& log);
 
-  /// The result files and tables of a run with this setup, and its series.
-  static std::vector<RunFile> dataFiles(const RunConfig& config);
-
   /// Throws FatalError if a file or folder that this run would write, rename or remove is not one of a run's.
   void requireReplaceableFiles(const RunConfig& config) const;
 
@@ -66,6 +63,8 @@ class RunResults final {
   void lockFailedRuns(RunLog& log);
   void startAfresh(const RunConfig& config, RunLog& log);
   void keepEarlierFiles(const RunConfig& config, RunLog& log) const;
+  /// Account, tables of failures and pairs, those of analyses.
+  std::vector<std::string> pathsBesideResults() const;
   std::vector<std::string> bandPaths(const RunConfig& config) const;
   /// Those of an unfinished run do not count any more when it goes on, and can be computed again.
   void removeStatistics(const RunConfig& config) const;

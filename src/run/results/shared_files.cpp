@@ -1,10 +1,11 @@
 #include "run/results/shared_files.h"
 
 #include <algorithm>
-#include <filesystem>
-#include <system_error>
+#include <iterator>
+#include <set>
+#include <utility>
 
-#include <fmt/core.h>
+#include <fmt/format.h>
 
 #include "common/file_lock.h"
 #include "common/files.h"
@@ -15,88 +16,102 @@
 namespace mirevo {
 namespace {
 
-constexpr std::string_view kSetupEnding = ".kdx";
-
-/// Whether a setup whose name is longer than another's by `rest` may write its file: `basin_Optimisation.kdx` that of
-/// `basin.kdx` named `basin_Optimisation_Run.dat`.
-bool mayWrite(std::string_view rest, const RunFile& file) {
-  std::string_view ownStem = file.stem;
-  return !rest.empty() && takeText(ownStem, rest) && (ownStem.empty() || ownStem.starts_with("_"));
+/// What the name of a setup has more than that of another with which it shares a file.
+std::vector<std::string> sharingEndings() {
+  std::set<std::string> endings;
+  for (const RunFile& shorter : runFilesOfSetup()) {
+    for (const RunFile& longer : runFilesOfSetup()) {
+      std::string_view ending = shorter.stem;
+      const bool isLock = shorter.extension == run_files::kRunLock.extension;  // they keep each other away
+      if (isLock || shorter.extension != longer.extension || !ending.ends_with(longer.stem)) continue;
+      ending.remove_suffix(longer.stem.size());
+      if (!ending.empty()) endings.emplace(ending);
+    }
+  }
+  return {endings.begin(), endings.end()};
 }
 
-/// The names, without the ending, of the setups in the folder of `prefix`.
-std::vector<std::string> setupsBeside(const std::string& prefix) {
-  std::vector<std::string> names;
-  std::error_code failed;
-  std::filesystem::directory_iterator entry(std::filesystem::path(prefix).parent_path(), failed);
-  for (; !failed && entry != std::filesystem::directory_iterator(); entry.increment(failed)) {
-    std::string name = entry->path().filename().string();
-    if (name.size() <= kSetupEnding.size()) continue;
-    const std::size_t length = name.size() - kSetupEnding.size();
-    if (!equalIgnoringCase(std::string_view(name).substr(length), kSetupEnding)) continue;
-    name.resize(length);
-    names.push_back(std::move(name));
-  }
-  std::sort(names.begin(), names.end());
-  names.erase(std::unique(names.begin(), names.end()), names.end());  // basin.kdx and basin.KDX
-  return names;
-}
-
-/// The setup that the first lines of a result name; empty where there is no such line.
-std::string_view setupNamedIn(std::string_view head) {
-  constexpr std::string_view kLabel = "# Setup file: ";
-  for (std::string_view line : splitLines(head)) {
-    if (takeText(line, kLabel)) return trimTrailing(line);
-    if (!line.starts_with("#")) break;
-  }
-  return {};
+std::string_view withoutEnding(std::string_view path) {
+  constexpr std::string_view kSetupEnding = ".kdx";
+  const std::size_t length = path.size() - std::min(path.size(), kSetupEnding.size());
+  return equalIgnoringCase(path.substr(length), kSetupEnding) ? path.substr(0, length) : path;
 }
 
 }  // namespace
 
-std::vector<std::string> prefixesThatShare(const std::string& prefix, std::span<const RunFile> files) {
-  const std::size_t nameStart = prefix.rfind('/') + 1;
+std::vector<std::string> prefixesThatShare(const std::string& prefix) {
   std::vector<std::string> prefixes;
-  for (const std::string& name : setupsBeside(prefix)) {
-    std::string_view rest = name;
-    if (!takeText(rest, std::string_view(prefix).substr(nameStart))) continue;
-    if (std::any_of(files.begin(), files.end(), [rest](const RunFile& file) { return mayWrite(rest, file); })) {
-      prefixes.push_back(prefix.substr(0, nameStart) + name);
+  const std::string_view name = std::string_view(prefix).substr(prefix.rfind('/') + 1);
+  for (const std::string& ending : sharingEndings()) {
+    prefixes.push_back(prefix + ending);
+    if (name.size() > ending.size() && name.ends_with(ending)) {
+      prefixes.push_back(prefix.substr(0, prefix.size() - ending.size()));
     }
   }
   return prefixes;
 }
 
 std::string runningPrefixThatShares(const std::string& prefix) {
-  const std::size_t nameStart = prefix.rfind('/') + 1;
-  const std::span<const RunFile> files = runFilesOfSetup();
-  for (const std::string& name : setupsBeside(prefix)) {
-    std::string_view rest = std::string_view(prefix).substr(nameStart);
-    if (!takeText(rest, name)) continue;
-    const bool shares =
-        std::any_of(files.begin(), files.end(), [rest](const RunFile& file) { return mayWrite(rest, file); });
-    std::string found = prefix.substr(0, nameStart) + name;
-    if (shares && FileLock::isHeld(runFilePath(found, run_files::kRunLock))) return found;
+  for (std::string& other : prefixesThatShare(prefix)) {
+    if (FileLock::isHeld(runFilePath(other, run_files::kRunLock))) return std::move(other);
   }
   return {};
 }
 
-std::string keepEarlierResults(const std::string& path, const std::string& setupFile, RunLog& log) {
-  std::string kept = keepEarlierFile(path);
-  if (kept.empty()) return kept;
-  std::string reason;
-  const auto head = readFileHead(kept, reason);
-  const std::string_view earlier = setupNamedIn(head ? *head : std::string_view());
-  if (!head) {
+std::string setupNamedIn(std::string_view head) {
+  constexpr std::string_view kLabel = "# Setup file: ";
+  for (std::string_view line : splitLines(head)) {
+    if (takeText(line, kLabel)) return std::string(trimTrailing(line));
+    if (!line.starts_with("#")) break;
+  }
+  return {};
+}
+
+bool isSameSetup(std::string_view one, std::string_view other) {
+  return withoutEnding(fileNameOf(one)) == withoutEnding(fileNameOf(other));
+}
+
+std::vector<std::string> keepEarlierResults(std::span<const std::string> paths, const std::string& setupFile,
+                                            RunLog& log) {
+  std::vector<std::string> kept;
+  std::vector<std::string> ofAnother;
+  std::string another;
+  for (const std::string& path : paths) {
+    kept.push_back(keepEarlierFile(path));
+    if (kept.back().empty()) continue;
+    std::string reason;
+    const auto head = readFileHead(kept.back(), reason);
+    const std::string earlier = head ? setupNamedIn(*head) : std::string();
+    if (!head) {
+      log.warning(fmt::format("{}, kept from an earlier run: {}. Whether it is of this setup is not known", kept.back(),
+                              reason));
+    } else if (!earlier.empty() && !isSameSetup(earlier, setupFile)) {
+      another = earlier;
+      ofAnother.push_back(kept.back());
+    }
+  }
+  if (!ofAnother.empty()) {
     log.warning(
-        fmt::format("{}, kept from an earlier run: {}. Whether it is of this setup is not known", kept, reason));
-  } else if (!earlier.empty() && fileNameOf(earlier) != fileNameOf(setupFile)) {
-    log.warning(fmt::format(
-        "{} held results of another setup, {}, which shares this name with {}. They were kept as {}. Give one of the "
-        "setups another name",
-        path, earlier, setupFile, kept));
+        fmt::format("Results of another setup, {}, had the names of this run's, and were kept as {}. Give one "
+                    "of the setups another name",
+                    another, fmt::join(ofAnother, ", ")));
   }
   return kept;
+}
+
+void keepResultsOfAnother(const std::string& results, std::span<const std::string> paths, const std::string& setupFile,
+                          RunLog& log) {
+  const auto setupOf = [](const std::string& path) {
+    std::string ignored;
+    return setupNamedIn(readFileHead(path, ignored).value_or(""));
+  };
+  const std::string own = setupOf(results);  // as it was called then
+  std::vector<std::string> ofAnother;
+  std::copy_if(paths.begin(), paths.end(), std::back_inserter(ofAnother), [&](const std::string& path) {
+    const std::string setup = setupOf(path);
+    return !own.empty() && !setup.empty() && !isSameSetup(setup, own);
+  });
+  keepEarlierResults(ofAnother, setupFile, log);
 }
 
 }  // namespace mirevo

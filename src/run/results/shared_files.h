@@ -10,15 +10,27 @@
 
 namespace mirevo {
 
-/// Folder and name, without ".kdx", of each other setup in the folder whose runs may write some of `files`, those of
-/// the setup with this prefix: the results of `basin_Run.kdx` and the account of `basin.kdx` are both `basin_Run.dat`.
-std::vector<std::string> prefixesThatShare(const std::string& prefix, std::span<const RunFile> files);
+/// Folder and name, without ".kdx", of the setups that share a file with the setup of this prefix by their names:
+/// `basin_Run.kdx` has its results in `basin_Run.dat`, where `basin.kdx` has the account of its run. Whether there are
+/// such setups is another matter.
+std::vector<std::string> prefixesThatShare(const std::string& prefix);
 
-/// Folder and name of a setup in the folder whose run is going on and may hold the lock of the setup with this prefix
-/// as it shares files with it; empty when there is none.
+/// The first of them of which a run is going on, by its lock; empty when there is none.
 std::string runningPrefixThatShares(const std::string& prefix);
 
-/// keepEarlierFile(), with a warning if the head of the file names another setup, whose results then have moved.
-std::string keepEarlierResults(const std::string& path, const std::string& setupFile, RunLog& log);
+/// The setup that the first lines of a result name; empty where there is no such line.
+std::string setupNamedIn(std::string_view head);
+/// Whether two paths are those of one setup, but for the folder and however the ending is spelt.
+bool isSameSetup(std::string_view one, std::string_view other);
+
+/// keepEarlierFile() for each of the results, and the names under which they are kept, empty ones included. With a
+/// warning if the heads of some name another setup, whose results then have moved.
+std::vector<std::string> keepEarlierResults(std::span<const std::string> paths, const std::string& setupFile,
+                                            RunLog& log);
+
+/// The same for those of `paths` whose heads name another setup than that of `results`: a run that goes on would
+/// replace them by its own.
+void keepResultsOfAnother(const std::string& results, std::span<const std::string> paths, const std::string& setupFile,
+                          RunLog& log);
 
 }  // namespace mirevo

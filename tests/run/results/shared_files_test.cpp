@@ -9,35 +9,33 @@
 namespace mirevo {
 namespace {
 
-using ::testing::ElementsAre;
+using ::testing::AllOf;
+using ::testing::Contains;
+using ::testing::Each;
 using ::testing::HasSubstr;
-using ::testing::IsEmpty;
+using ::testing::Not;
 
 TEST(SharedFiles, AreThoseOfSetupsNamedAfterAResultOfAnother) {
   const TemporaryFolder folder;
-  for (const char* name : {"x.kdx", "x_Optimisation.KDX", "x_Run.kdx", "x_Opt.kdx", "y_Optimisation.kdx"}) {
-    folder.write(name, "");
-  }
-  const std::string searching = folder / "x";
-  const RunFile search[] = {run_files::kOptimisation.results, run_files::kOptimisation.record};
-  const RunFile scenarios[] = {run_files::kPlain.results, run_files::kPlain.record};
-  EXPECT_THAT(prefixesThatShare(searching, search), ElementsAre(searching + "_Optimisation"));
-  EXPECT_THAT(prefixesThatShare(searching, scenarios), ElementsAre(searching + "_Run"));
-  EXPECT_THAT(prefixesThatShare(searching + "_Run", scenarios), IsEmpty());
-
+  const std::string name = folder / "x_Run";
+  EXPECT_THAT(prefixesThatShare(name),
+              AllOf(Contains(folder / "x"), Contains(name + "_Optimisation_Run"), Contains(name + "_Termination"),
+                    Not(Contains(name + "_Saved")), Not(Contains(name + "_Process"))));
   FileLock lock;
-  ASSERT_TRUE(lock.take(searching + "._lock_", {}, 0.0));
-  EXPECT_EQ(runningPrefixThatShares(searching + "_Optimisation"), searching);
-  EXPECT_EQ(runningPrefixThatShares(searching + "_Opt"), "");
+  ASSERT_TRUE(lock.take((folder / "x") + "._lock_", {}, 0.0));
+  EXPECT_EQ(runningPrefixThatShares(folder / "x_Optimisation"), folder / "x");
+  EXPECT_EQ(runningPrefixThatShares(folder / "x_Opt"), "");
 }
 
-TEST(SharedFiles, KeptResultsOfAnotherSetupAreToldOf) {
+TEST(SharedFiles, KeptResultsOfAnotherSetupAreToldOfOnce) {
   const TemporaryFolder folder;
-  for (const auto& [setup, warnings] : {std::pair{"/old/x.kdx", 0}, {"/old/x_Optimisation.kdx", 1}}) {
-    const std::string path =
-        folder.write("x_Optimisation.dat", std::string("# Title\n# Setup file: ") + setup + "\n1\tOK\n");
+  for (const auto& [setup, warnings] : {std::pair{"/old/x.KDX", 0}, {"/old/x_Optimisation.kdx", 1}}) {
+    std::vector<std::string> paths;
+    for (const char* file : {"x_Optimisation.dat", "x_Optimisation_Run.dat"}) {
+      paths.push_back(folder.write(file, std::string("# Title\n# Setup file: ") + setup + "\n1\tOK\n"));
+    }
     RunLog log;
-    EXPECT_THAT(keepEarlierResults(path, folder / "x.kdx", log), HasSubstr("/x_Optimisation."));
+    EXPECT_THAT(keepEarlierResults(paths, folder / "x.kdx", log), Each(HasSubstr("/x_Optimisation")));
     EXPECT_EQ(log.warningCount(), warnings) << setup;
   }
 }
