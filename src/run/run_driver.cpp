@@ -480,9 +480,8 @@ void RunDriver::logFailures() {
 /// one of them.
 void RunDriver::warnOfFewerPairs() {
   if (!reporter_) return;
-  const std::size_t compared = reporter_->numbersWithPairs().size();
-  if (compared < 2) return;
-  const std::size_t count = compared - 1;
+  const std::size_t count = reporter_->countOfFewerPairs();
+  if (count == 0) return;
   state_.log.warning(fmt::format("{} judged by fewer observations than the initial run: the end of {} names {}",
                                  count == 1 ? "1 evaluation is" : fmt::format("{} evaluations are", count),
                                  fileNameOf(results_->table().path()), count == 1 ? "it" : "them"));

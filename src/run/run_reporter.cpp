@@ -112,6 +112,12 @@ std::set<int> RunReporter::numbersWithPairs() const {
   return numbers;
 }
 
+std::size_t RunReporter::countOfFewerPairs() const {
+  std::set<int> numbers;
+  for (const auto& [key, fewer] : fewer_) numbers.insert(key.first);
+  return numbers.size();
+}
+
 void RunReporter::count(const std::vector<double>& parameterValues, const EvaluationResult& result,
                         std::string_view foundAt) {
   ++evaluationCount_;

@@ -61,6 +61,8 @@ class RunReporter final : public EvaluationObserver {
   /// The initial run and the evaluations that have other pairs; empty as long as it is not known which is the initial
   /// one.
   std::set<int> numbersWithPairs() const;
+  /// How many evaluations have fewer pairs than the initial run.
+  std::size_t countOfFewerPairs() const;
 
   int evaluationCount() const { return evaluationCount_; }
   int failedCount() const { return failedCount_; }
