@@ -242,10 +242,12 @@ void noteIncomparable(const IncomparableOutputs& incomparable, const Sensitivity
       }
       if (count == 0) continue;
       if (count > kMostNamed) list += fmt::format(" and {} more", count - kMostNamed);
+      const std::string_view pronoun = count == 1 ? "it" : "them";
       difference.warnings.push_back(
           isUnknown
-              ? fmt::format("it has no derivatives of {} and their objective functions: {}", list, reason)
-              : fmt::format("its differences of {} and their objective functions are one-sided: {}", list, reason));
+              ? fmt::format("it has no derivatives of {} and of objective functions with {}: {}", list, pronoun, reason)
+              : fmt::format("its differences of {} and of objective functions with {} are one-sided: {}", list, pronoun,
+                            reason));
     }
   }
 }

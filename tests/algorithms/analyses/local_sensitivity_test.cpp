@@ -326,12 +326,15 @@ TEST(LocalSensitivity, ComparesMeasuresOfTheSameObservationsOnly) {
   const std::tuple<Differencing, std::size_t, std::size_t, std::size_t, double, std::string> cases[] = {
       {kCentral, 9, 9, 9, 1, ""},
       {kCentral, 9, 8, 9, 1,
-       "its differences of \"flow\" and their objective functions are one-sided: evaluation 3 has 8 pairs of simulated "
-       "and observed values, the base run 9"},
+       "its differences of \"flow\" and of objective functions with it are one-sided: evaluation 3 has 8 pairs of "
+       "simulated and observed values, the base run 9"},
       {kCentral, 8, 9, 9, 1, ""},
-      {kCentral, 9, 8, 7, NAN, "it has no derivatives of \"flow\" and their objective functions: evaluation 2 has 7"},
-      {kForward, 9, 8, 9, NAN, "it has no derivatives of \"flow\" and their objective functions: evaluation 2 has 8"},
-      {kForward, 8, 9, 9, NAN, "it has no derivatives of \"flow\" and their objective functions: evaluation 2 has 9"},
+      {kCentral, 9, 8, 7, NAN,
+       "it has no derivatives of \"flow\" and of objective functions with it: evaluation 2 has 7"},
+      {kForward, 9, 8, 9, NAN,
+       "it has no derivatives of \"flow\" and of objective functions with it: evaluation 2 has 8"},
+      {kForward, 8, 9, 9, NAN,
+       "it has no derivatives of \"flow\" and of objective functions with it: evaluation 2 has 9"},
   };
   for (const auto& [differencing, base, above, below, derivative, warning] : cases) {
     FunctionEvaluator evaluator([&](const ParameterSet& p) {
