@@ -28,9 +28,10 @@ std::string listOf(std::span<const std::string> names) {
 
 }  // namespace
 
-EqualMeasures::EqualMeasures(SearchSpace space, std::vector<std::string> measures,
+EqualMeasures::EqualMeasures(SearchSpace space, ParameterFields fields, std::vector<std::string> measures,
                              std::vector<std::string> parameterFiles, std::vector<std::string> resultFiles)
     : space_(std::move(space)),
+      fields_(std::move(fields)),
       measures_(std::move(measures)),
       parameterFiles_(std::move(parameterFiles)),
       resultFiles_(std::move(resultFiles)),
@@ -41,17 +42,18 @@ std::optional<std::string> EqualMeasures::findIn(std::span<const ParameterSet> s
   if (isSettled_) return std::nullopt;
   for (std::size_t i = 0; i < results.size(); ++i) {
     if (!results[i].ok()) continue;
-    std::vector<double> values = ToModelScale(space_, sets[i]);
+    std::vector<double> written = valuesAsWritten(fields_, space_, sets[i]);
     if (++runCount_ == 1) {
       measureValues_ = results[i].measureValues;
-      parameterValues_ = std::move(values);
+      written_ = std::move(written);
       continue;
     }
-    isSettled_ = isSettled_ || results[i].measureValues != measureValues_;
-    doParametersDiffer_ = doParametersDiffer_ || values != parameterValues_;
+    isSettled_ = results[i].measureValues != measureValues_;
+    if (isSettled_) return std::nullopt;
+    otherCount_ += written != written_ ? 1 : 0;
   }
-  const bool isEnough = sets.size() > 1 || runCount_ >= kEnoughRuns || isLast;
-  if (isSettled_ || !doParametersDiffer_ || !isEnough) return std::nullopt;
+  const bool isEnough = sets.size() > 1 || otherCount_ + 1 >= kEnoughRuns || isLast;
+  if (otherCount_ == 0 || !isEnough) return std::nullopt;
   isSettled_ = true;
   return warning();
 }

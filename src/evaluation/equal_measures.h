@@ -7,19 +7,21 @@
 
 #include "common/parameter_set.h"
 #include "evaluation/evaluation_result.h"
+#include "parameters/parameter_fields.h"
 #include "parameters/search_space.h"
 
 namespace mirevo {
 
-/// Notices that a model ignores its parameters: all its successful runs have the same measures, though their parameters
-/// differ. What it finds depends on the batches alone, not on the order in which model runs end.
+/// Notices that a model ignores its parameters: all its successful runs have the same measures, though the
+/// values that it got differ. What it finds depends on the batches alone, not on the order in which model runs end.
 class EqualMeasures final {
  public:
   /// Never finds anything.
   EqualMeasures() = default;
-  /// The names of the measures, of the parameter files and of the files from which the measures are read.
-  EqualMeasures(SearchSpace space, std::vector<std::string> measures, std::vector<std::string> parameterFiles,
-                std::vector<std::string> resultFiles);
+  /// The fields of the parameters; the names of the measures, of the parameter files and of the files from which the
+  /// measures are read.
+  EqualMeasures(SearchSpace space, ParameterFields fields, std::vector<std::string> measures,
+                std::vector<std::string> parameterFiles, std::vector<std::string> resultFiles);
 
   /// Takes a complete batch; returns a warning, once in a run, if the measures have not changed by the end of a sample,
   /// of twenty successful runs or, with `isLast`, of the run.
@@ -30,14 +32,15 @@ class EqualMeasures final {
   std::string warning() const;
 
   SearchSpace space_;
+  ParameterFields fields_;
   std::vector<std::string> measures_;
   std::vector<std::string> parameterFiles_;
   std::vector<std::string> resultFiles_;
-  bool isSettled_ = true;                ///< nothing more is to be found
-  int runCount_ = 0;                     ///< successful ones
-  std::vector<double> parameterValues_;  ///< of the first successful run, on the model scale
-  std::vector<double> measureValues_;    ///< of the same
-  bool doParametersDiffer_ = false;
+  bool isSettled_ = true;              ///< nothing more is to be found
+  int runCount_ = 0;                   ///< successful ones
+  std::vector<double> written_;        ///< what the model got in the first successful run
+  std::vector<double> measureValues_;  ///< of the same
+  int otherCount_ = 0;                 ///< successful runs in which it got something else
 };
 
 }  // namespace mirevo

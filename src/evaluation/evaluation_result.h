@@ -74,6 +74,10 @@ struct MeasurePairs {
   ValueSummary simulated;
 
   bool operator==(const MeasurePairs&) const = default;
+  /// Whether these are pairs of the same observations, as far as their number, times and values tell.
+  bool hasObservationsOf(const MeasurePairs& other) const {
+    return count == other.count && first == other.first && last == other.last && observed == other.observed;
+  }
 };
 
 /// What one parameter set yielded.
@@ -94,8 +98,8 @@ struct EvaluationResult {
   std::vector<PeriodSeries> shownSeries;
   std::optional<EvaluationFailure> failure;
   std::vector<UnusedObservations> unusedObservations;
-  /// One per measure that compares series. Empty once the evaluation has been reported, and for an evaluation of an
-  /// earlier run that is known to have no fewer than the initial run.
+  /// One per measure that compares series. Once the evaluation has been reported, and for one of an earlier run, only
+  /// those of the initial run, of runs with other pairs, and of runs that ended before the initial one was known.
   std::vector<MeasurePairs> pairs;
   std::vector<std::string> warnings;  ///< warnings for the log, one line each
 

@@ -22,8 +22,7 @@ PairsFound InitialPairs::take(EvaluationResult& result) {
   if (!comparesSeries_) return found;
   if (!result.ok()) result.pairs.clear();
   if (initialNumber_ != 0) {
-    found.fewer = findFewer(result.number, result.pairs);
-    if (found.fewer.empty()) result.pairs.clear();
+    if (!compare(result.number, result.pairs, found)) result.pairs.clear();
     return found;
   }
   waiting_[result.number] = result.pairs;
@@ -40,9 +39,7 @@ PairsFound InitialPairs::take(EvaluationResult& result) {
   if (initialNumber_ == 0) return found;
   found.initialNumber = initialNumber_;
   found.initialLines = linesOfInitial();
-  for (const auto& [number, pairs] : waiting_) {
-    for (FewerPairs& fewer : findFewer(number, pairs)) found.fewer.push_back(std::move(fewer));
-  }
+  for (const auto& [number, pairs] : waiting_) compare(number, pairs, found);
   waiting_.clear();
   return found;
 }
@@ -67,18 +64,23 @@ std::vector<std::string> InitialPairs::linesOfInitial() const {
   return lines;
 }
 
-std::vector<FewerPairs> InitialPairs::findFewer(int number, std::span<const MeasurePairs> pairs) const {
-  std::vector<FewerPairs> fewer;
-  for (const MeasurePairs& found : pairs) {
+bool InitialPairs::compare(int number, std::span<const MeasurePairs> pairs, PairsFound& found) const {
+  bool hasFewer = false;
+  bool hasOthers = false;
+  for (const MeasurePairs& each : pairs) {
     const auto initial = std::find_if(initial_.begin(), initial_.end(),
-                                      [&found](const MeasurePairs& other) { return other.measure == found.measure; });
-    if (initial == initial_.end() || found.count >= initial->count) continue;
-    fewer.push_back(
-        {number, found.measure, found.count, initial->count,
+                                      [&each](const MeasurePairs& other) { return other.measure == each.measure; });
+    if (initial == initial_.end() || each.hasObservationsOf(*initial)) continue;
+    hasOthers = true;
+    if (each.count >= initial->count) continue;
+    hasFewer = true;
+    found.fewer.push_back(
+        {number, each.measure, each.count, initial->count,
          fmt::format("output measure \"{}\" has {} pairs, {} in the initial run, No. {}",
-                     trimTrailing(measureNames_.at(found.measure)), found.count, initial->count, initialNumber_)});
+                     trimTrailing(measureNames_.at(each.measure)), each.count, initial->count, initialNumber_)});
   }
-  return fewer;
+  if (hasOthers && !hasFewer) found.others.push_back(number);
+  return hasOthers;
 }
 
 }  // namespace mirevo

@@ -25,8 +25,9 @@ struct PairsFound {
   int initialNumber = 0;                  ///< of the initial run, if that has become known; otherwise 0
   std::vector<std::string> initialLines;  ///< then its pairs, for people
   std::vector<FewerPairs> fewer;          ///< in the order of the evaluations
+  std::vector<int> others;                ///< evaluations that have as many or more, of other observations
 
-  bool isEmpty() const { return initialNumber == 0 && fewer.empty(); }
+  bool isEmpty() const { return initialNumber == 0 && fewer.empty() && others.empty(); }
 };
 
 /// The pairs of the initial run, of which later runs must have a share. Nothing is required without any.
@@ -47,8 +48,8 @@ class InitialPairs final {
       : measureNames_(std::move(measureNames)), isRequired_(isRequired), comparesSeries_(true) {}
 
   /// Takes a finished evaluation, in any order; each number once. Keeps its pairs only if they are needed to compare
-  /// the evaluations of the run again: those of the initial run, of runs that have fewer, and of runs that ended before
-  /// the initial one was known.
+  /// the evaluations of the run again: those of the initial run, of runs that have others, and of runs that ended
+  /// before the initial one was known.
   PairsFound take(EvaluationResult& result);
   /// Whether no run may be judged before the initial one is known.
   bool isAwaited() const { return comparesSeries_ && isRequired_ && initialNumber_ == 0; }
@@ -56,7 +57,8 @@ class InitialPairs final {
 
  private:
   std::vector<std::string> linesOfInitial() const;
-  std::vector<FewerPairs> findFewer(int number, std::span<const MeasurePairs> pairs) const;
+  /// Adds what an evaluation has otherwise than the initial run; returns whether there is anything.
+  bool compare(int number, std::span<const MeasurePairs> pairs, PairsFound& found) const;
 
   std::vector<std::string> measureNames_;
   bool isRequired_ = false;

@@ -185,7 +185,9 @@ EqualMeasures ModelRunner::equalMeasures() const {
   for (std::vector<std::string>* const files : {&written, &read}) {
     for (std::string& file : *files) file.erase(0, description_.baseFolder.size() + 1);
   }
-  return {parameters_.searchSpace(), std::move(names), std::move(written), std::move(read)};
+  return {parameters_.searchSpace(),
+          parameterFields(parameters_, widestPlaceholders(templates_, parameters_.parameters().size())),
+          std::move(names), std::move(written), std::move(read)};
 }
 
 InitialPairs ModelRunner::initialPairs() const {

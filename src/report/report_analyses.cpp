@@ -18,6 +18,7 @@
 #include "common/text.h"
 #include "evaluation/stored_results.h"
 #include "measures/period_series.h"
+#include "parameters/parameter_fields.h"
 #include "parameters/parameter_model.h"
 #include "parameters/read_template.h"
 #include "platform/series/time_series_object.h"
@@ -26,7 +27,7 @@ namespace mirevo {
 namespace {
 
 /// An evaluator that answers with the results in the rows; an evaluation that is not there counts as failed.
-StoredResults resultsOf(const RunConfig& config, std::span<const ResultRow> rows) {
+StoredResults resultsOf(const RunConfig& config, std::span<const ResultRow> rows, const PairsByNumber& pairs) {
   std::map<int, EvaluationResult> results;
   for (const ResultRow& row : rows) {
     EvaluationResult& result = results[row.number];
@@ -34,6 +35,7 @@ StoredResults resultsOf(const RunConfig& config, std::span<const ResultRow> rows
     result.objectiveValues = row.objectives;
     result.aggregate = row.aggregate;
     if (!row.ok) result.failure.emplace();
+    if (const auto found = pairs.find(row.number); found != pairs.end()) result.pairs = found->second;
   }
   EvaluationResult missing;
   missing.measureValues.assign(config.measures.size(), kFailedRunValue);
@@ -144,14 +146,15 @@ std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::stri
 }
 
 std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, const SensitivitySettings& settings,
-                                                       const SearchSpace& space, std::span<const ResultRow> rows) {
+                                                       const SearchSpace& space, std::span<const ResultRow> rows,
+                                                       const PairsByNumber& pairs) {
   const auto isBase = [](const ResultRow& row) { return row.number == 1 && row.ok; };
   if (std::none_of(rows.begin(), rows.end(), isBase)) return std::nullopt;
-  StoredResults evaluator = resultsOf(config, rows);
+  StoredResults evaluator = resultsOf(config, rows, pairs);
   ParameterModel parameters(config.parameters, config.constraints);
   const LocalSensitivity found =
-      localSensitivity(settings, space, evaluator, ofVariableParameters(fieldWidths(config), config.parameters),
-                       parameters.feasibility());
+      localSensitivity(settings, space, evaluator, parameterFields(parameters, fieldWidths(config)),
+                       parameters.feasibility(), config.objectives, config.measures);
   ReportedSensitivity reported;
   reported.parameters = space.names;
   for (const OutputMeasure& measure : config.measures) reported.outputs.push_back(measure.name);
@@ -223,7 +226,7 @@ std::optional<ReportedCovariance> reportedCovariance(const std::string& filePref
   found.correlationFile = fileNameOf(correlationFile);
   for (const std::vector<std::string>& cells : limits.rows) {
     if (!cells[*leftOut].empty()) {
-      found.leftOut.push_back(cells.front());
+      found.leftOut.push_back({cells.front(), cells[*leftOut]});
       continue;
     }
     const std::vector<double> numbers = numbersOf(cells, 1);

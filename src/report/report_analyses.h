@@ -9,6 +9,7 @@
 #include "algorithms/analyses/local_sensitivity.h"
 #include "parameters/search_space.h"
 #include "report/report_data.h"
+#include "run/results/pairs_file.h"
 #include "run/results/result_row.h"
 #include "run/setup/run_config.h"
 
@@ -23,10 +24,11 @@ std::string pairName(std::span<const OutputMeasure> measures, std::size_t measur
 std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::string& filePrefix, const RunRecord& record,
                                         std::vector<std::string>& faults);
 
-/// The results of a local sensitivity analysis, computed from its rows, whose statistics are of 32 bits; empty without
-/// a row for the initial values.
+/// The results of a local sensitivity analysis, computed from its rows, whose statistics are of 32 bits, and the pairs
+/// of its runs; empty without a row for the initial values.
 std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, const SensitivitySettings& settings,
-                                                       const SearchSpace& space, std::span<const ResultRow> rows);
+                                                       const SearchSpace& space, std::span<const ResultRow> rows,
+                                                       const PairsByNumber& pairs);
 
 /// Takes the derivatives, which are of 64 bits, and the ranking from the table of a finished analysis, if it has
 /// written one.

@@ -89,6 +89,14 @@ struct ReportedBand {
 };
 
 /// The parameter covariance of a sensitivity analysis on the model scale, one entry per parameter that has a variance.
+/// A parameter without a variance, and why.
+struct ReportedLeftOut {
+  std::string name;
+  std::string reason;
+
+  bool operator==(const ReportedLeftOut&) const = default;
+};
+
 struct ReportedCovariance {
   std::vector<std::string> names;
   std::vector<double> estimate;
@@ -96,8 +104,8 @@ struct ReportedCovariance {
   std::vector<double> lower95;
   std::vector<double> upper95;
   std::vector<std::vector<double>> correlation;
-  std::string correlationFile;       ///< its name
-  std::vector<std::string> leftOut;  ///< parameters without a variance
+  std::string correlationFile;  ///< its name
+  std::vector<ReportedLeftOut> leftOut;
 };
 
 struct ReportedSensitivity {

@@ -207,7 +207,11 @@ void writeSensitivity(JsonWriter& json, const ReportedSensitivity& sensitivity) 
       }
       json.endArray().member("correlationFile", covariance.correlationFile);
     }
-    json.member("leftOut", covariance.leftOut).endObject();
+    json.key("leftOut").beginArray();
+    for (const auto& [name, reason] : covariance.leftOut) {
+      json.beginObject().member("name", name).member("reason", reason).endObject();
+    }
+    json.endArray().endObject();
   } else {
     json.null();
   }

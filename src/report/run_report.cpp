@@ -53,6 +53,7 @@ class ReportBuilder final {
   void addEvaluations();
   void findBestAndInitial();
   void addMeasures();
+  PairsByNumber pairsOfRuns() const;
   void noteFewerPairsOfBest();
   void addFailures();
   void addSeries();
@@ -202,11 +203,14 @@ void ReportBuilder::addMeasures() {
   }
 }
 
+PairsByNumber ReportBuilder::pairsOfRuns() const {
+  return readPairs(filePrefix_, config_.task->facts().resultFiles).content.value_or(PairsByNumber{});
+}
+
 /// In a run that has come to its end the closing lines of its results say so.
 void ReportBuilder::noteFewerPairsOfBest() {
   if (best_ == nullptr || !data_.summary.empty()) return;
-  const PairsByNumber pairs =
-      readPairs(filePrefix_, config_.task->facts().resultFiles).content.value_or(PairsByNumber{});
+  const PairsByNumber pairs = pairsOfRuns();
   const auto ofBest = pairs.find(best_->number);
   if (ofBest == pairs.end()) return;
   for (const MeasurePairs& found : ofBest->second) {
@@ -283,7 +287,7 @@ void ReportBuilder::addAnalyses() {
     for (const std::string& fault : faults) note(fault + ".");
   }
   if (task.sensitivity != nullptr) {
-    data_.sensitivity = reportedSensitivity(config_, *task.sensitivity, space(), sources_.results.rows);
+    data_.sensitivity = reportedSensitivity(config_, *task.sensitivity, space(), sources_.results.rows, pairsOfRuns());
   }
   if (!isFinished && (analysed || data_.sensitivity)) {
     const std::vector<bool>& ok = data_.evaluations.ok;

@@ -306,7 +306,8 @@ TaskContext RunDriver::taskContext() {
           [this](const SearchSummary& summary) { reporter_->takeBestOf(summary); },
           filePrefix_,
           runner_->observedSeries(),
-          widestPlaceholders(runner_->templates(), config_.parameters.size()),
+          parameterFields(*parameters_, widestPlaceholders(runner_->templates(), config_.parameters.size())),
+          [this](std::span<const double> values) { return aggregator_->aggregate(values); },
           parameters_->feasibility(),
           [this](std::string_view text) { warn(text); }};
 }
@@ -498,9 +499,8 @@ void RunDriver::logFailures() {
 /// one of them.
 void RunDriver::warnOfFewerPairs() {
   if (!reporter_) return;
-  const std::size_t compared = reporter_->numbersWithPairs().size();
-  if (compared < 2) return;
-  const std::size_t count = compared - 1;
+  const std::size_t count = reporter_->countOfFewerPairs();
+  if (count == 0) return;
   state_.log.warning(fmt::format("{} judged by fewer observations than the initial run: the end of {} names {}",
                                  count == 1 ? "1 evaluation is" : fmt::format("{} evaluations are", count),
                                  fileNameOf(results_->table().path()), count == 1 ? "it" : "them"));

@@ -73,6 +73,7 @@ void RunReporter::pairsFound(const PairsFound& found) {
     state_.log.line(fmt::format("   {}: {}", progress::nameOfEvaluation(fewer.number), fewer.text));
     fewer_.insert_or_assign({fewer.number, fewer.measure}, fewer);
   }
+  others_.insert(found.others.begin(), found.others.end());
 }
 
 std::vector<std::string> RunReporter::fewerPairsLines() const {
@@ -105,9 +106,16 @@ std::string RunReporter::fewerPairsOfBest() const {
 
 std::set<int> RunReporter::numbersWithPairs() const {
   if (initialRun_ == 0) return {};
-  std::set<int> numbers{initialRun_};
+  std::set<int> numbers = others_;
+  numbers.insert(initialRun_);
   for (const auto& [key, fewer] : fewer_) numbers.insert(key.first);
   return numbers;
+}
+
+std::size_t RunReporter::countOfFewerPairs() const {
+  std::set<int> numbers;
+  for (const auto& [key, fewer] : fewer_) numbers.insert(key.first);
+  return numbers.size();
 }
 
 void RunReporter::count(const std::vector<double>& parameterValues, const EvaluationResult& result,

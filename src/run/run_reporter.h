@@ -58,9 +58,11 @@ class RunReporter final : public EvaluationObserver {
   std::vector<std::string> fewerPairsLines() const;
   /// A sentence that says so of the best evaluation; empty if it has all of them.
   std::string fewerPairsOfBest() const;
-  /// The initial run and the evaluations that have fewer pairs; empty as long as it is not known which is the initial
+  /// The initial run and the evaluations that have other pairs; empty as long as it is not known which is the initial
   /// one.
   std::set<int> numbersWithPairs() const;
+  /// How many evaluations have fewer pairs than the initial run.
+  std::size_t countOfFewerPairs() const;
 
   int evaluationCount() const { return evaluationCount_; }
   int failedCount() const { return failedCount_; }
@@ -98,6 +100,7 @@ class RunReporter final : public EvaluationObserver {
   FailureSummary failures_;
   int initialRun_ = 0;                                       ///< with whose pairs others are compared
   std::map<std::pair<int, std::size_t>, FewerPairs> fewer_;  ///< by evaluation and measure
+  std::set<int> others_;  ///< evaluations with as many pairs or more, of other observations
 };
 
 }  // namespace mirevo

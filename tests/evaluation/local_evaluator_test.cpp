@@ -153,6 +153,8 @@ TEST_F(LocalEvaluatorTest, AModelWhoseMeasuresNeverChangeIsToldOfOnce) {
       {{{9.5, 0}, {1, 2}, {0}}, 2, "All 3 successful"},
       {twentyOne, 20, "All 20 successful"},
       {{{0, 0}, {0, 0}, {0}}, 0, ""},
+      {{{0.3, 0.3 + 1e-16}, {0.3 + 1e-16}, {0.3}}, 0, ""},  // which is written alike
+      {{{0.3, 0.3 + 1e-16}, {0.3, 2}, {0.3}}, 2, "All 4 successful"},
       {{{0, 4}, {1, 2}, {0}}, 0, ""},
   };
   for (const auto& [batches, warnedAfter, text] : cases) {

@@ -145,7 +145,11 @@ std::vector<double> deviationsOf(const CertifiedProblem& problem, const std::str
   folder.write("model/parameters.tpl", lines);
   folder.write(
       "model/run.sh",
-      fmt::format("#!/bin/sh\nawk 'BEGIN {{ while ((getline line < \"parameters.txt\") > 0) b[++n] = line + 0\n"
+      fmt::format("#!/bin/sh\nawk 'function single(y, e) {{ e = 2 ^ (23 - int(log(y) / log(2) + 99) + 99)\n"
+                  "  return int(y * e + 0.5) / e }}\n"
+                  "function shortest(y, p) {{ for (p = 1; single(sprintf(\"%.\" p \"g\", y) + 0) != y; p++); return "
+                  "sprintf(\"%.\" p \"g\", y) }}\n"
+                  "BEGIN {{ while ((getline line < \"parameters.txt\") > 0) b[++n] = line + 0\n"
                   "  print \"time,y\"\n  while ((getline line < \"x.txt\") > 0) {{ split(line, word, \" \")\n"
                   "    x = word[2] + 0; printf \"%s,%.17g\\n\", word[1], {} }} }}' >simulated.csv\n",
                   problem.formula),
@@ -307,15 +311,19 @@ TEST(LocalSensitivity, LeavesOutAParameterOfAFewChoicesUnlessAskedFor) {
 }
 
 TEST(LocalSensitivity, LeavesOutTheSecondOfTwoParametersThatActAsASumAtAnyStep) {
-  for (const char* format : {"%.6f", "%.7g", "%.17g"}) {
+  const std::string inDouble = "(b[1] + b[2]) * exp(-x / 7)";
+  const std::string inSingle = "single(single(b[1] + b[2]) * single(exp(-x / 7)))";
+  for (const std::string& printed :
+       {"sprintf(\"%.6f\", " + inDouble, "sprintf(\"%.7g\", " + inDouble, "sprintf(\"%.17g\", " + inDouble,
+        "sprintf(\"%.8g\", " + inSingle, "sprintf(\"%.9g\", " + inSingle, "shortest(" + inSingle}) {
     CertifiedProblem problem{nullptr, "", {{"3.1", 0}, {"2.7", 0}}};
-    const std::string formula = fmt::format("sprintf(\"{}\", (b[1] + b[2]) * exp(-x / 7)) + 0", format);
+    const std::string formula = printed + ") + 0";
     problem.formula = formula.c_str();
     for (int i = 0; i < 40; ++i) problem.data += fmt::format("{} {} ", i, 5.8 * std::exp(-i / 7.0) + (i % 3 - 1) * 0.1);
     for (const char* fraction : {"1e-2", "1e-3", "1e-4"}) {
       const std::vector<double> deviations = deviationsOf(problem, fraction);
-      EXPECT_GT(deviations[0], 0.0) << format << " " << fraction;
-      EXPECT_TRUE(std::isnan(deviations[1])) << format << " " << fraction << " " << deviations[1];
+      EXPECT_GT(deviations[0], 0.0) << printed << " " << fraction;
+      EXPECT_TRUE(std::isnan(deviations[1])) << printed << " " << fraction << " " << deviations[1];
     }
   }
 }

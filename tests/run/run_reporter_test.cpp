@@ -112,6 +112,9 @@ TEST_F(RunReporterTest, EvaluationsThatMeetFewerObservationsThanTheInitialRunAre
     arrive(number, number == 7 ? 1.0 : 2.0, two);
     reporter_.pairsFound({0, {}, {{number, 0, 2, 48, "2 of 48"}}});
   }
+  reporter_.pairsFound({.others = {26}});
+  EXPECT_EQ(reporter_.countOfFewerPairs(), 22U);
+  EXPECT_EQ(reporter_.numbersWithPairs().size(), 24U);  // with those of the initial run, and of others
   EXPECT_EQ(reporter_.fewerPairsOfBest(),
             "The best evaluation, No. 7, is judged by fewer observations than the initial run: 2 of 48");
   const std::vector<std::string> lines = reporter_.fewerPairsLines();

@@ -9,9 +9,10 @@
 
 #include <fmt/core.h>
 
+#include "algorithms/analyses/compared_observations.h"
+#include "algorithms/analyses/written_step.h"
 #include "common/run_files.h"
 #include "common/text.h"
-#include "parameters/value_format.h"
 
 namespace mirevo {
 
@@ -60,6 +61,12 @@ Step wantedStep(const SensitivitySettings& settings, const SearchSpace& space, s
   return step;
 }
 
+/// Whether there is room for a step; 0.3 - 0.1 is 0.19999999999999998, but a step of 0.2 fits.
+bool fits(double step, double room) {
+  constexpr double kRounding = 1.0 + 1.0e-12;
+  return step <= room * kRounding;
+}
+
 /// Why a parameter of a few choices is left out; empty if it is none.
 std::string problemOfChoices(const SearchSpace& space, std::size_t j) {
   if (space.transformation[j] != TransformationType::integer) return {};
@@ -99,8 +106,8 @@ ParameterDifference planDifference(const Step& step, bool central, std::size_t j
     }
     return difference;
   }
-  const bool fitsUp = step.up <= step.roomUp;
-  const bool fitsDown = step.down <= step.roomDown;
+  const bool fitsUp = fits(step.up, step.roomUp);
+  const bool fitsDown = fits(step.down, step.roomDown);
   const double above = x + std::min(step.up, step.roomUp);
   const double below = x - std::min(step.down, step.roomDown);
   const auto violationAbove = violationAt(above, j, sets.front(), feasibility);
@@ -134,52 +141,10 @@ ParameterDifference planDifference(const Step& step, bool central, std::size_t j
   return difference;
 }
 
-/// The search-scale value of what the model reads for a value of parameter j; empty if the field holds no number.
-std::optional<double> searchValueAsWritten(const SearchSpace& space, std::size_t j, double value, int fieldWidth) {
-  const double modelValue = toModelScale(space, j, value);
-  const std::optional<double> written = valueAsWritten(modelValue, fieldWidth);
-  if (!written || *written == modelValue) return written ? std::optional(value) : std::nullopt;
-  if (space.transformation[j] != TransformationType::logarithmic) return written;
-  return *written > 0.0 ? std::optional(std::log(*written)) : std::nullopt;
-}
-
-/// Takes the width of a difference as the model gets it from a field of this many characters.
-void takeWidthAsWritten(const SearchSpace& space, std::size_t j, int fieldWidth, std::span<const ParameterSet> sets,
-                        ParameterDifference& difference) {
-  constexpr double kWorthAWarning = 0.01;
-  constexpr double kExact = 1.0e-9;  // a field that holds 15 digits: what it cuts is no more than a rounding error
-  const double minusValue = sets[difference.minus][j];
-  const double plusValue = sets[difference.plus][j];
-  const std::optional<double> minus = searchValueAsWritten(space, j, minusValue, fieldWidth);
-  const std::optional<double> plus = searchValueAsWritten(space, j, plusValue, fieldWidth);
-  const double wanted = difference.width;
-  difference.width = minus && plus ? *plus - *minus : 0.0;
-  if (std::abs(difference.width - wanted) <= kExact * wanted) {
-    difference.width = wanted;
-    return;
-  }
-  if (difference.isCentral()) {
-    const double base = searchValueAsWritten(space, j, sets.front()[j], fieldWidth).value_or(kNaN);
-    difference.widthBelow = minus ? base - *minus : kNaN;
-    difference.widthAbove = plus ? *plus - base : kNaN;
-  }
-  const std::string fields =
-      fmt::format("in its field of {} characters {} is written as \"{}\" and {} as \"{}\"", fieldWidth,
-                  formatReal(toModelScale(space, j, minusValue)),
-                  trim(FormatValueForPlaceholder(toModelScale(space, j, minusValue), fieldWidth)),
-                  formatReal(toModelScale(space, j, plusValue)),
-                  trim(FormatValueForPlaceholder(toModelScale(space, j, plusValue), fieldWidth)));
-  if (difference.width == 0.0) {
-    difference.problem = fields;
-  } else if (std::abs(difference.width - wanted) > kWorthAWarning * wanted) {
-    difference.warnings.push_back(fields + "; the difference is that of the values as written");
-  }
-}
-
 /// `valuesOf(result)` returns the outputs of an evaluation.
 template <class ValuesOf>
 SensitivityTable tabulate(const PerturbationPlan& plan, std::span<const EvaluationResult> results,
-                          const ValuesOf& valuesOf) {
+                          const IncomparableOutputs& incomparable, const ValuesOf& valuesOf) {
   std::vector<std::vector<double>> outputs;
   for (const EvaluationResult& result : results) {
     outputs.push_back(result.ok() ? valuesOf(result) : std::vector<double>{});
@@ -187,9 +152,20 @@ SensitivityTable tabulate(const PerturbationPlan& plan, std::span<const Evaluati
   SensitivityTable table;
   const EvaluationResult& base = results.front();
   table.base = base.ok() ? outputs.front() : std::vector<double>(valuesOf(base).size(), kNaN);
+  for (std::size_t k = 0; k < outputs.size(); ++k) {
+    for (std::size_t i = 0; i < std::min(outputs[k].size(), incomparable[k].size()); ++i) {
+      if (!incomparable[k][i].empty()) outputs[k][i] = kNaN;
+    }
+  }
   table.derivatives = differenceColumns(plan, outputs);
   for (std::size_t j = 0; j < plan.differences.size(); ++j) {
     table.derivatives[j].resize(table.base.size(), kNaN);
+    std::vector<std::string>& problems = table.problems.emplace_back(table.base.size(), plan.differences[j].problem);
+    for (const std::size_t k : {plan.differences[j].minus, plan.differences[j].plus}) {
+      for (std::size_t i = 0; i < std::min(problems.size(), incomparable[k].size()); ++i) {
+        if (problems[i].empty() && std::isnan(table.derivatives[j][i])) problems[i] = incomparable[k][i];
+      }
+    }
     std::vector<double> scaled;
     double squares = 0.0;
     std::size_t known = 0;
@@ -224,6 +200,58 @@ void noteFailures(PerturbationPlan& plan, std::span<const EvaluationResult> resu
   }
 }
 
+/// The measures that do not compare, where the two runs of a difference judge the model by different observations.
+IncomparableOutputs incomparableMeasures(const PerturbationPlan& plan, std::span<const EvaluationResult> results) {
+  const ComparedObservations observations(results);
+  IncomparableOutputs found(results.size());
+  const bool hasBase = results.front().ok();
+  for (const ParameterDifference& difference : plan.differences) {
+    const std::size_t minus = difference.minus;
+    const std::size_t plus = difference.plus;
+    if (!results[minus].ok() || !results[plus].ok()) continue;
+    for (std::size_t i = 0; i < results[plus].measureValues.size(); ++i) {
+      if (observations.areSame(minus, plus, i)) continue;
+      for (const auto& [one, other] : {std::pair(minus, plus), std::pair(plus, minus)}) {
+        if (one == 0 || (hasBase && observations.areSame(one, 0, i))) continue;
+        found[one].resize(results[one].measureValues.size());
+        found[one][i] =
+            observations.differenceText(one, hasBase ? 0 : other, i,
+                                        hasBase ? "the base run" : fmt::format("evaluation {}", results[other].number));
+      }
+    }
+  }
+  return found;
+}
+
+/// Says of each measure that does not compare whether its difference is one-sided or unknown.
+void noteIncomparable(const IncomparableOutputs& incomparable, const SensitivityTable& measures,
+                      std::span<const OutputMeasure> names, PerturbationPlan& plan) {
+  constexpr std::size_t kMostNamed = 5;
+  for (std::size_t j = 0; j < plan.differences.size(); ++j) {
+    ParameterDifference& difference = plan.differences[j];
+    for (const bool isUnknown : {false, true}) {
+      std::string list;
+      std::string reason;
+      std::size_t count = 0;
+      for (std::size_t i = 0; i < names.size() && difference.problem.empty(); ++i) {
+        const auto& below = incomparable[difference.minus];
+        const auto& ofRun = below.empty() || below[i].empty() ? incomparable[difference.plus] : below;
+        if (ofRun.empty() || ofRun[i].empty() || isUnknown != std::isnan(measures.derivatives[j][i])) continue;
+        if (reason.empty()) reason = ofRun[i];
+        if (++count <= kMostNamed) list += fmt::format("{}{}", count == 1 ? "" : ", ", quotedForMessage(names[i].name));
+      }
+      if (count == 0) continue;
+      if (count > kMostNamed) list += fmt::format(" and {} more", count - kMostNamed);
+      const std::string_view pronoun = count == 1 ? "it" : "them";
+      difference.warnings.push_back(
+          isUnknown
+              ? fmt::format("it has no derivatives of {} and of objective functions with {}: {}", list, pronoun, reason)
+              : fmt::format("its differences of {} and of objective functions with {} are one-sided: {}", list, pronoun,
+                            reason));
+    }
+  }
+}
+
 /// Whether just one side of a central difference has no value.
 bool lacksOneSide(const ParameterDifference& difference, double below, double above) {
   return difference.isCentral() && std::isnan(below) != std::isnan(above);
@@ -238,30 +266,18 @@ double quotient(const ParameterDifference& difference, double below, double base
   return (std::isnan(below) ? above - base : base - below) / width;
 }
 
-/// Whether a run has no value for an observation that the base run has one for: their measures do not compare.
-bool comparesFewerValues(const EvaluationResult& result, const EvaluationResult& base) {
-  for (const UnusedObservations& unused : result.unusedObservations) {
-    const auto ofBase = std::find_if(base.unusedObservations.begin(), base.unusedObservations.end(),
-                                     [&](const UnusedObservations& other) { return other.measure == unused.measure; });
-    if (ofBase == base.unusedObservations.end() || unused.usedCount < ofBase->usedCount) return true;
-  }
-  // After a restart, where a task keeps the values.
-  for (std::size_t i = 0; i < std::min(result.simulatedValues.size(), base.simulatedValues.size()); ++i) {
-    if (std::isnan(result.simulatedValues[i]) && !std::isnan(base.simulatedValues[i])) return true;
-  }
-  return false;
-}
-
 /// The warning of perturbed runs that fit better than the base set; empty where there is none.
 std::string betterFitText(std::span<const EvaluationResult> results) {
-  constexpr double kRounding = 1.0 - 1.0e-6;  // of the statistics, in 32 bits
+  constexpr double kRounding = 1.0 - 1.0e-6;  // of the values that the model writes
   const EvaluationResult& base = results.front();
   const EvaluationResult* best = nullptr;
   std::size_t count = 0;
-  for (const EvaluationResult& result : results) {
+  const ComparedObservations observations(results);
+  for (std::size_t i = 1; i < results.size(); ++i) {
+    const EvaluationResult& result = results[i];
     // A negative aggregate is no measure of a misfit.
     if (!base.ok() || !result.ok() || !(result.aggregate >= 0.0 && result.aggregate < base.aggregate * kRounding) ||
-        comparesFewerValues(result, base)) {
+        !observations.areSame(i, 0)) {
       continue;
     }
     ++count;
@@ -325,7 +341,7 @@ const SettingSection<SensitivitySettings>& localSensitivitySection() {
 }
 
 PerturbationPlan planPerturbations(const SensitivitySettings& settings, const SearchSpace& space,
-                                   std::span<const double> base, std::span<const int> fieldWidths,
+                                   std::span<const double> base, const ParameterFields& fields,
                                    const Feasibility& feasibility) {
   PerturbationPlan plan;
   plan.sets.emplace_back(base.begin(), base.end());
@@ -339,44 +355,40 @@ PerturbationPlan planPerturbations(const SensitivitySettings& settings, const Se
     }
     const bool isCentral = settings.differencing == Differencing::central;
     plan.differences.push_back(planDifference(step, isCentral, j, feasibility, plan.sets));
-    const int fieldWidth = j < fieldWidths.size() ? fieldWidths[j] : 0;
-    if (fieldWidth == 0 || !plan.differences.back().problem.empty()) continue;
-    takeWidthAsWritten(space, j, fieldWidth, plan.sets, plan.differences.back());
+    if (!plan.differences.back().problem.empty()) continue;
+    takeWidthAsWritten(fields, space, j, plan.sets, plan.differences.back());
   }
   return plan;
 }
 
-std::vector<int> ofVariableParameters(std::span<const int> fieldWidths, std::span<const ModelParameter> parameters) {
-  std::vector<int> widths;
-  for (std::size_t i = 0; i < fieldWidths.size(); ++i) {
-    if (parameters[i].parameterType == ParameterType::variable) widths.push_back(fieldWidths[i]);
-  }
-  return widths;
-}
-
 bool hasRoomForStep(const SensitivitySettings& settings, const SearchSpace& space, std::size_t j) {
-  constexpr double kRounding = 1.0 + 1.0e-12;
   const Step step = wantedStep(settings, space, space.initial, j);
   if (!settings.perturbsChoices && !problemOfChoices(space, j).empty()) return true;  // left out by name
   // Bounds that leave a single value leave no parameter to perturb; it is left out by name.
   if (step.roomUp + step.roomDown == 0.0) return true;
-  return step.up <= step.roomUp * kRounding || step.down <= step.roomDown * kRounding;
+  return fits(step.up, step.roomUp) || fits(step.down, step.roomDown);
 }
 
 LocalSensitivity localSensitivity(const SensitivitySettings& settings, const SearchSpace& space, Evaluator& evaluator,
-                                  std::span<const int> fieldWidths, const Feasibility& feasibility,
-                                  std::span<const ObjectiveFunction> objectives) {
+                                  const ParameterFields& fields, const Feasibility& feasibility,
+                                  std::span<const ObjectiveFunction> objectives,
+                                  std::span<const OutputMeasure> measures) {
   LocalSensitivity sensitivity;
-  sensitivity.plan = planPerturbations(settings, space, space.initial, fieldWidths, feasibility);
+  sensitivity.plan = planPerturbations(settings, space, space.initial, fields, feasibility);
   sensitivity.results = evaluator.evaluateParameterSets(sensitivity.plan.sets, DispatchMode::task);
   noteFailures(sensitivity.plan, sensitivity.results);
-  sensitivity.measures = tabulate(sensitivity.plan, sensitivity.results, [](const EvaluationResult& result) {
-    return result.exactMeasures.empty() ? result.measureValues : result.exactMeasures;
-  });
-  sensitivity.objectives = tabulate(sensitivity.plan, sensitivity.results, [&](const EvaluationResult& result) {
-    return result.exactMeasures.empty() ? result.objectiveValues
-                                        : objectiveFunctionValues(objectives, result.exactMeasures);
-  });
+  const IncomparableOutputs incomparable = incomparableMeasures(sensitivity.plan, sensitivity.results);
+  sensitivity.measures =
+      tabulate(sensitivity.plan, sensitivity.results, incomparable, [](const EvaluationResult& result) {
+        return result.exactMeasures.empty() ? result.measureValues : result.exactMeasures;
+      });
+  sensitivity.objectives = tabulate(sensitivity.plan, sensitivity.results, ofObjectives(incomparable, objectives),
+                                    [&](const EvaluationResult& result) {
+                                      return result.exactMeasures.empty()
+                                                 ? result.objectiveValues
+                                                 : objectiveFunctionValues(objectives, result.exactMeasures);
+                                    });
+  noteIncomparable(incomparable, sensitivity.measures, measures, sensitivity.plan);
   const bool hasObjectives = !sensitivity.objectives.base.empty();
   sensitivity.ranking = ranked(hasObjectives ? sensitivity.objectives.composite : sensitivity.measures.composite);
   return sensitivity;
@@ -473,7 +485,7 @@ std::vector<DataTable> sensitivityTables(const LocalSensitivity& sensitivity, co
     const auto add = [&](const std::string& kind, const SensitivityTable& found, std::span<const std::string> outputs) {
       for (std::size_t i = 0; i < outputs.size(); ++i) {
         table.rows.push_back({names.parameters[j], kind, outputs[i], found.derivatives[j][i], found.scaled[j][i],
-                              found.composite[j], sensitivity.plan.differences[j].problem});
+                              found.composite[j], found.problems[j][i]});
       }
     };
     add("measure", sensitivity.measures, names.measures);

@@ -10,7 +10,9 @@
 #include "common/settings/keyword_row.h"
 #include "evaluation/evaluator.h"
 #include "measures/objective_functions.h"
+#include "measures/output_measure.h"
 #include "parameters/feasibility.h"
+#include "parameters/parameter_fields.h"
 #include "parameters/search_space.h"
 
 namespace mirevo {
@@ -59,15 +61,12 @@ struct PerturbationPlan {
 /// Perturbs each parameter of `base` by the fraction of its range on the search scale, or of its value on the model
 /// scale (a logarithmic parameter x becomes x (1 + fraction)); an integer parameter moves by whole steps, at least one.
 /// Where a step would leave the bounds the difference is one-sided, inwards; where neither side has room the step is
-/// shortened. The width of a difference is that of the values that a model reads from a field of `fieldWidths`
-/// characters, one entry per parameter of the space (0 or no entry: any value as it is). A side that cannot be run is
-/// left out where the other one can. Of a parameter of a few choices there is no set unless the settings ask for it.
+/// shortened. The width of a difference is that of the values that a model reads from `fields`; without a field, any
+/// value as it is. A side that cannot be run is left out where the other one can. Of a parameter of a few choices there
+/// is no set unless the settings ask for it.
 PerturbationPlan planPerturbations(const SensitivitySettings& settings, const SearchSpace& space,
-                                   std::span<const double> base, std::span<const int> fieldWidths = {},
+                                   std::span<const double> base, const ParameterFields& fields = {},
                                    const Feasibility& feasibility = {});
-
-/// The entries of the variable parameters, of one per model parameter.
-std::vector<int> ofVariableParameters(std::span<const int> fieldWidths, std::span<const ModelParameter> parameters);
 
 /// Whether parameter j has room for its whole step from the initial value of the space in at least one direction.
 bool hasRoomForStep(const SensitivitySettings& settings, const SearchSpace& space, std::size_t j);
@@ -79,6 +78,7 @@ struct SensitivityTable {
   /// Dimensionless: derivative times the parameter's extent, divided by the absolute value of the output; NaN where
   /// that is 0.
   std::vector<std::vector<double>> scaled;
+  std::vector<std::vector<std::string>> problems;  ///< p rows of m: why there is no derivative
   std::vector<double> composite;  ///< root mean square of the known scaled derivatives, one per parameter
 };
 
@@ -100,11 +100,14 @@ std::vector<std::size_t> ranked(std::span<const double> values);
 
 /// Evaluates all perturbed sets in one batch, the base set (the space's initial values) first. Where one of the two
 /// runs of a central difference failed, the other and the base set give a one-sided one; else a failed run leaves its
-/// parameter's derivatives out. The plan says so. Measures are those in 64 bits where the results have them, and so are
-/// the values of `objectives`, which may be left out otherwise.
+/// parameter's derivatives out. Where one judges the model by other observations than the base set, by a measure of
+/// `measures`, the same is done for this measure and the objective functions that contain it. The plan says so.
+/// Measures are those in 64 bits where the results have them, and so are the values of `objectives`, which may be left
+/// out otherwise.
 LocalSensitivity localSensitivity(const SensitivitySettings& settings, const SearchSpace& space, Evaluator& evaluator,
-                                  std::span<const int> fieldWidths = {}, const Feasibility& feasibility = {},
-                                  std::span<const ObjectiveFunction> objectives = {});
+                                  const ParameterFields& fields = {}, const Feasibility& feasibility = {},
+                                  std::span<const ObjectiveFunction> objectives = {},
+                                  std::span<const OutputMeasure> measures = {});
 
 /// The derivatives of any outputs by differences: p columns, one row per value; NaN for a parameter with a problem.
 /// `outputs[i]` are the values of set i; those of a failed set may be empty. A value that one side of a central

@@ -28,6 +28,12 @@ bool isWithinBounds(const SearchSpace& space, std::size_t j, double value) {
   return step >= space.lower[j] && step <= modelUpperBound(space, j);
 }
 
+/// Whether a mean is a value between the bounds. A mean above an integer's largest value, but below the next, is that
+/// of values around it.
+bool isMeanWithinBounds(const SearchSpace& space, std::size_t j, double mean) {
+  return mean >= space.lower[j] && isWithinBounds(space, j, mean);
+}
+
 /// The model takes the step below a drawn value, so that a mean on a step has half of its values on the step below.
 std::string integerLine(const SearchSpace& space, std::size_t j, double mean) {
   const double step = toModelScale(space, j, mean);
@@ -75,12 +81,12 @@ std::vector<std::string> distributionWarnings(const UncertaintySettings& setting
   std::vector<std::string> warnings;
   for (std::size_t j = 0; j < settings.parameters.size(); ++j) {
     const double mean = settings.parameters[j].mean;
-    if (isWithinBounds(space, j, mean)) continue;
-    std::string text = fmt::format(
-        "Mean_Value of PARAMETER_{} ({}) is {}, on the model scale {:.6g}: outside the bounds {:.6g} to "
-        "{:.6g}",
-        j + 1, space.names[j], formatReal(mean), toModelScale(space, j, mean), toModelScale(space, j, space.lower[j]),
-        modelUpperBound(space, j));
+    if (isMeanWithinBounds(space, j, mean)) continue;
+    const std::string onModelScale =
+        isInteger(space, j) ? "" : fmt::format(", on the model scale {:.6g}", toModelScale(space, j, mean));
+    std::string text = fmt::format("Mean_Value of PARAMETER_{} ({}) is {}{}: outside the bounds {:.6g} to {:.6g}",
+                                   j + 1, space.names[j], formatReal(mean), onModelScale,
+                                   toModelScale(space, j, space.lower[j]), modelUpperBound(space, j));
     const bool isLogarithm = space.transformation[j] == TransformationType::logarithmic;
     if (isLogarithm && mean > 0.0 && isWithinBounds(space, j, std::log(mean))) {
       text += fmt::format("; the mean of a logarithmic parameter is that of its natural logarithm, ln({}) = {:.6g}",

@@ -179,6 +179,12 @@ UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome, const
   summary.failedCount = outcome.results.size() - successful.size();
   summary.parameters = summariseColumns(
       modelValues.size(), [&](std::size_t i) -> auto& { return modelValues[i]; });
+  for (std::size_t j = 0; j < summary.parameters.size(); ++j) {
+    if (space.transformation[j] != TransformationType::integer) continue;
+    std::vector<double> steps;
+    for (const std::vector<double>& values : modelValues) steps.push_back(values[j]);
+    summary.parameters[j] = summariseSample(steps, QuantileKind::ofValues);
+  }
   summary.correlations = correlationMatrix(modelValues);
   summary.measures = summariseColumns(
       successful.size(), [&](std::size_t i) -> auto& { return successful[i]->measureValues; });

@@ -27,7 +27,7 @@ std::string cellText(double value) {
 
 }  // namespace
 
-SampleSummary summariseSample(std::span<const double> values) {
+SampleSummary summariseSample(std::span<const double> values, QuantileKind kind) {
   std::vector<double> sorted;
   for (const double value : values) {
     if (std::isfinite(value)) sorted.push_back(value);
@@ -41,14 +41,18 @@ SampleSummary summariseSample(std::span<const double> values) {
   for (const double value : sorted) squares += (value - summary.mean) * (value - summary.mean);
   summary.standardDeviation = sorted.size() < 2 ? kNaN : std::sqrt(squares / static_cast<double>(sorted.size() - 1));
   for (std::size_t k = 0; k < kSummaryProbabilities.size(); ++k) {
-    summary.quantiles[k] = sortedQuantile(sorted, kSummaryProbabilities[k]);
+    summary.quantiles[k] = sortedQuantile(sorted, kSummaryProbabilities[k], kind);
   }
   return summary;
 }
 
-double sortedQuantile(std::span<const double> ascending, double probability) {
+double sortedQuantile(std::span<const double> ascending, double probability, QuantileKind kind) {
   if (ascending.empty()) return kNaN;
   const double position = static_cast<double>(ascending.size() - 1) * probability;
+  if (kind == QuantileKind::ofValues) {
+    constexpr double kRounding = 1.0e-9;  // 20 times 0.15 is 2.9999999999999996
+    return ascending[std::min(static_cast<std::size_t>(position + kRounding), ascending.size() - 1)];
+  }
   const auto below = static_cast<std::size_t>(position);
   if (below + 1 >= ascending.size()) return ascending.back();
   return ascending[below] + (position - std::floor(position)) * (ascending[below + 1] - ascending[below]);

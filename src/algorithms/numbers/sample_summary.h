@@ -23,11 +23,18 @@ struct SampleSummary {
   std::array<double, kSummaryProbabilities.size()> quantiles{};  ///< at kSummaryProbabilities
 };
 
-SampleSummary summariseSample(std::span<const double> values);
+/// How a quantile between two order statistics is found.
+enum class QuantileKind {
+  interpolated,
+  ofValues,  ///< the lower of them: one of the values
+};
+
+SampleSummary summariseSample(std::span<const double> values, QuantileKind kind = QuantileKind::interpolated);
 
 /// The quantile of ascending values at a probability in [0, 1], linear between the order statistics around
 /// (n - 1) p: type 7 of Hyndman and Fan (1996), doi:10.1080/00031305.1996.10473566. NaN without a value.
-double sortedQuantile(std::span<const double> ascending, double probability);
+double sortedQuantile(std::span<const double> ascending, double probability,
+                      QuantileKind kind = QuantileKind::interpolated);
 
 /// The sample correlation of two samples of equal length; NaN if one of them is constant or they have fewer than 2
 /// values.

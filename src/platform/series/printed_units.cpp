@@ -4,12 +4,41 @@
 #include <charconv>
 #include <cmath>
 #include <limits>
+#include <optional>
 #include <string_view>
 
 namespace mirevo {
 
+namespace {
+
+/// Digits that tell one number of 32 bits from the next in some decades, and in all of them.
+constexpr int kFewSingleDigits = 8;
+constexpr int kSingleDigits = 9;
+
+/// The number that the text of a number of 32 bits stands for, with this many digits or with as few as tell it from
+/// others.
+double readAgain(float single, std::optional<int> digits) {
+  char text[64];
+  const auto end =
+      digits ? std::to_chars(std::begin(text), std::end(text), single, std::chars_format::scientific, *digits - 1).ptr
+             : std::to_chars(std::begin(text), std::end(text), single).ptr;
+  double value = 0.0;
+  std::from_chars(std::begin(text), end, value);
+  return value;
+}
+
+/// Whether all values are texts of numbers of 32 bits with this many digits, or the shortest ones.
+bool areTextsOfSingles(std::span<const double> values, int digits) {
+  return std::all_of(values.begin(), values.end(), [digits](double value) {
+    if (!std::isfinite(value)) return true;
+    const auto single = static_cast<float>(value);
+    return readAgain(single, digits) == value || readAgain(single, std::nullopt) == value;
+  });
+}
+
+}  // namespace
+
 std::vector<double> printedUnits(std::span<const double> values) {
-  constexpr int kSingleDigits = 9;
   int mostDigits = 0;
   int lowestPlace = std::numeric_limits<int>::max();
   bool isSingle = true;
@@ -25,7 +54,9 @@ std::vector<double> printedUnits(std::span<const double> values) {
     lowestPlace = std::min(lowestPlace, exponent - digits + 1);
     isSingle = isSingle && static_cast<double>(static_cast<float>(value)) == value;
   }
-  if (isSingle && mostDigits > kSingleDigits) return singleUnits(values);
+  const bool isTextOfSingles =
+      mostDigits >= kFewSingleDigits && mostDigits <= kSingleDigits && areTextsOfSingles(values, mostDigits);
+  if ((isSingle && mostDigits > kSingleDigits) || isTextOfSingles) return singleUnits(values);
   std::vector<double> units;
   for (const double value : values) {
     const double size = std::abs(value);

@@ -134,7 +134,7 @@ export interface Covariance {
   correlation: Maybe[][]; // empty where there are too many parameters to show it
   largestCorrelations?: { first: string; second: string; value: Maybe }[]; // then these
   correlationFile?: string; // which has all of them
-  leftOut: string[];
+  leftOut: { name: string; reason: string }[];
 }
 
 export interface Sensitivity {

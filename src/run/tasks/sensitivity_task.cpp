@@ -145,6 +145,15 @@ void addCovariance(const TaskContext& context, const ParameterSet& set, const Li
   outcome.tables.push_back(jacobianTable(*found.model, context.space, found.labels));
 }
 
+/// The aggregates of 64 bits: what rounding leaves of a change by a small step is not taken for a better fit.
+void takeExactAggregates(const TaskContext& context, std::span<EvaluationResult> results) {
+  if (!context.aggregate) return;
+  for (EvaluationResult& result : results) {
+    if (!result.ok() || result.exactMeasures.empty()) continue;
+    result.aggregate = context.aggregate(objectiveFunctionValues(context.objectives, result.exactMeasures));
+  }
+}
+
 }  // namespace
 
 const TaskFacts& SensitivityTask::facts() const {
@@ -180,9 +189,9 @@ int SensitivityTask::plannedEvaluations(std::size_t variableCount) const {
 
 TaskOutcome SensitivityTask::outcomeOf(const TaskContext& context, Evaluator& evaluator) const {
   TaskOutcome outcome{std::string(kEndOfTask)};
-  const std::vector<int> fieldWidths = ofVariableParameters(context.fieldWidths, context.parameters);
-  LocalSensitivity sensitivity =
-      localSensitivity(settings, context.space, evaluator, fieldWidths, context.feasibility, context.objectives);
+  LocalSensitivity sensitivity = localSensitivity(settings, context.space, evaluator, context.fields,
+                                                  context.feasibility, context.objectives, context.measures);
+  takeExactAggregates(context, sensitivity.results);
   Linearised found;
   if (settings.calculatesCovariance) found = linearised(context, sensitivity);
   if (found.model) takeObservations(*found.model, sensitivity);

@@ -19,6 +19,7 @@
 #include "measures/observed_series.h"
 #include "measures/output_measure.h"
 #include "parameters/feasibility.h"
+#include "parameters/parameter_fields.h"
 #include "parameters/search_space.h"
 #include "run/access/setup_access.h"
 #include "run/progress/run_log.h"
@@ -60,8 +61,9 @@ struct TaskContext {
   std::string filePrefix = {};  ///< folder and name of the setup: the beginning of the paths of the run's files
   /// The observations whose simulated values the results hold; needed if the task keepsSimulatedValues().
   std::span<const ObservedSeries> observedSeries = {};
-  /// By model parameter, the width of the widest placeholder into which it is written; 0: none.
-  std::vector<int> fieldWidths = {};
+  ParameterFields fields = {};
+  /// The aggregate of the objective functions' values. May be empty.
+  std::function<double(std::span<const double> objectiveValues)> aggregate = {};
   Feasibility feasibility = {};  ///< which sets can be run, of a model with constraints
   /// Shows the user a warning that the log receives as well. May be empty.
   std::function<void(std::string_view)> warnUser = {};

@@ -79,7 +79,7 @@ TEST(ParameterCovariance, LeavesOutTheRowThatAnyColumnLacks) {
   EXPECT_EQ(result.covariance, parameterCovariance(kLine).covariance);
   EXPECT_THAT(result.kept, ElementsAre(0, 1));
   EXPECT_THAT(formatCovariance(result, spaceOf({1, 2, 3}), std::vector<double>{1, 2, 3}),
-              Contains("Warning: 1 observations are left out of the covariance matrix: a perturbed run has no value "
+              Contains("Warning: 1 observation is left out of the covariance matrix: a perturbed run has no value "
                        "there"));
 }
 

@@ -51,6 +51,12 @@ TEST(PlanPerturbations, TakesItsStepsInsideTheBounds) {
       {"central at the lower bound", {kNone, 0, 0, 10}, {kCentral, kOfRange, 0.1}, 0, 1},
       {"no room either way", {kNone, 4, 0, 10}, {kCentral, kOfRange, 0.8}, 4, 10},
       {"no room, more below", {kNone, 6, 0, 10}, {kCentral, kOfRange, 0.8}, 0, 6},
+      {"up to both bounds but for rounding", {kNone, 0.3, 0.1, 0.5}, {kCentral, kOfRange, 0.5}, 0.1, 0.5},
+      {"the same of a logarithm",
+       {kLog, 0, std::log(0.1), std::log(10)},
+       {kCentral, kOfRange, 0.5},
+       -std::log(10),
+       std::log(10)},
       {"equal bounds", {kNone, 3, 3, 3}, {kCentral, kOfRange, 0.1}, 3, 3},
       {"equal bounds, of the value", {kNone, 3, 3, 3}, {kForward, kOfValue, 0.1}, 3, 3},
       {"value 0", {kNone, 0, -1, 1}, {kForward, kOfValue, 0.1}, 0, 0},
@@ -124,7 +130,7 @@ TEST(PlanPerturbations, NamesWhatHasASingleValueAndAStepThatRoundsAway) {
 
 /// A model that returns what it reads from fields of nine characters has the derivative 1.
 TEST(LocalSensitivity, DividesByTheStepAsWritten) {
-  constexpr int kWidths[] = {9, 9};
+  const ParameterFields fields{{9, 9}};
   FunctionEvaluator evaluator([](const ParameterSet& p) {
     EvaluationResult result;
     result.measureValues = {*valueAsWritten(p[0], 9) + std::log(*valueAsWritten(std::exp(p[1]), 9))};
@@ -134,17 +140,72 @@ TEST(LocalSensitivity, DividesByTheStepAsWritten) {
   const AnalysisNames names{space.names, {"y"}, {}};
   for (const Differencing differencing : {kForward, kCentral}) {
     for (const double fraction : {0.1, 0.0371, 0.0031}) {
-      const LocalSensitivity found = localSensitivity({differencing, kOfValue, fraction}, space, evaluator, kWidths);
+      const LocalSensitivity found = localSensitivity({differencing, kOfValue, fraction}, space, evaluator, fields);
       EXPECT_NEAR(found.measures.derivatives[0][0], 1.0, 1e-9) << fraction;
       EXPECT_NEAR(found.measures.derivatives[1][0], 1.0, 1e-9) << fraction;
     }
   }
   // 0.30103 (1 + 0.0031) is 0.301963193, which the field cuts after its fourth digit.
-  EXPECT_THAT(formatSensitivity(localSensitivity({kForward, kOfValue, 0.0031}, space, evaluator, kWidths), names),
+  EXPECT_THAT(formatSensitivity(localSensitivity({kForward, kOfValue, 0.0031}, space, evaluator, fields), names),
               Contains("Warning: Parameter p1: in its field of 9 characters 0.30103 is written as \"3.010E-01\" and "
                        "0.301963193 as \"3.019E-01\"; the difference is that of the values as written"));
-  EXPECT_EQ(planPerturbations({kForward, kOfValue, 1e-4}, space, space.initial, kWidths).differences[0].problem,
+  EXPECT_EQ(planPerturbations({kForward, kOfValue, 1e-4}, space, space.initial, fields).differences[0].problem,
             "in its field of 9 characters 0.30103 is written as \"3.010E-01\" and 0.301060103 as \"3.010E-01\"");
+}
+
+// The model reads a dependent parameter; or its fields keep different parts of the step.
+TEST(LocalSensitivity, DividesByWhatTheFieldsOfDependentParametersKeepOfTheStep) {
+  constexpr double kStart = 0.0123456;
+  const SearchSpace space = spaceOf({{kNone, kStart, 0, 1}});
+  const auto tenfold = [](double a) { return 10.0 * a; };
+  const auto extreme = [](double a) { return (a - kStart) * (a - kStart); };
+  const std::string asWritten = "; the difference is that of the values as written";
+  struct Case {
+    int ownWidth;
+    double (*equation)(double a);
+    int width;
+    bool readsDependent;
+    double fraction;
+    double derivative;
+    std::string text;  ///< of a problem, if there is no derivative
+  };
+  const Case cases[] = {
+      {0, tenfold, 9, true, 1e-3, 10,
+       "in the field of 9 characters of the dependent parameter d 0.123332544 is written as \"1.233E-01\" and "
+       "0.123579456 as \"1.235E-01\"" +
+           asWritten},
+      {0, tenfold, 9, true, 1e-4, NAN,
+       "in the field of 9 characters of the dependent parameter d 0.12344365439999999 is written as \"1.234E-01\" and "
+       "0.1234683456 as \"1.234E-01\""},
+      {0, tenfold, 20, true, 1e-4, 10, ""},
+      {9, tenfold, 9, true, 1e-3, 10, asWritten},  // both keep the same part
+      {9, tenfold, 20, true, 1e-3, 10,
+       "in its field of 9 characters 0.0123332544 is written as \"1.233E-02\" and 0.0123579456 as \"1.235E-02\"; the "
+       "fields that change with the parameter keep different parts of its step"},
+      {20, extreme, 9, false, 1e-3, 1, ""},
+  };
+  for (const Case& each : cases) {
+    FunctionEvaluator evaluator([&](const ParameterSet& p) {
+      EvaluationResult result;
+      result.measureValues = {each.readsDependent ? *valueAsWritten(each.equation(p[0]), each.width)
+                                                  : *valueAsWritten(p[0], each.ownWidth)};
+      return result;
+    });
+    const ParameterFields fields{{each.ownWidth}, {{"d", each.width}}, [&](std::span<const double> set) {
+                                   return std::vector<double>{each.equation(set[0])};
+                                 }};
+    const LocalSensitivity found = localSensitivity({kCentral, kOfValue, each.fraction}, space, evaluator, fields);
+    const ParameterDifference& difference = found.plan.differences[0];
+    const double derivative = found.measures.derivatives[0][0];
+    if (std::isnan(each.derivative)) {
+      EXPECT_TRUE(std::isnan(derivative));
+      EXPECT_EQ(difference.problem, each.text);
+      continue;
+    }
+    EXPECT_NEAR(derivative, each.derivative, 1e-9) << each.text;
+    EXPECT_EQ(difference.warnings.size(), each.text.empty() ? 0U : 1U) << each.text;
+    for (const std::string& warning : difference.warnings) EXPECT_THAT(warning, HasSubstr(each.text));
+  }
 }
 
 /// Measures x² + 3y and e^z; objective functions 2y and z.
@@ -239,9 +300,8 @@ TEST(LocalSensitivity, SaysOnceThatOthersFitBetter) {
     sensitivity.results[i].number = static_cast<int>(i) + 1;
     sensitivity.results[i].aggregate = aggregates[i];
   }
-  sensitivity.results[0].unusedObservations = {{0, 10, ""}};
-  sensitivity.results[1].unusedObservations = {{0, 10, ""}};
-  sensitivity.results[3].unusedObservations = {{0, 9, ""}};
+  sensitivity.results[0].pairs = {{.measure = 0, .count = 10}};
+  sensitivity.results[3].pairs = {{.measure = 0, .count = 9}};
   const auto warnings = [&] {
     std::vector<std::string> found;
     for (const std::string& line : formatSensitivity(sensitivity, {})) {
@@ -251,10 +311,55 @@ TEST(LocalSensitivity, SaysOnceThatOthersFitBetter) {
   };
   EXPECT_THAT(warnings(), ElementsAre("Warning: 2 evaluations fit better than the base set, evaluation 3 best: its "
                                       "aggregate is 2, not 4"));
-  sensitivity.results[0].simulatedValues = {1, 2};
-  sensitivity.results[2].simulatedValues = {1, NAN};
+  sensitivity.results[2].pairs = {{.measure = 0, .count = 11}};
   EXPECT_THAT(warnings(),
               ElementsAre("Warning: evaluation 2 fits better than the base set: its aggregate is 3, not 4"));
+}
+
+// The first measure is larger by 100 for each pair.
+TEST(LocalSensitivity, ComparesMeasuresOfTheSameObservationsOnly) {
+  const SearchSpace space = spaceOf({{kNone, 2, 0, 4}});
+  const std::vector<OutputMeasure> measures{{.name = "flow"}, {.name = "level"}, {.name = "peak"}};
+  const std::vector<ObjectiveFunction> objectives{{.name = "both", .measures = {0, 1}},
+                                                  {.name = "third", .measures = {2}}};
+  // differencing, pairs of flow in the base run and in those above and below, the derivative of flow, the warning
+  const std::tuple<Differencing, std::size_t, std::size_t, std::size_t, double, std::string> cases[] = {
+      {kCentral, 9, 9, 9, 1, ""},
+      {kCentral, 9, 8, 9, 1,
+       "its differences of \"flow\" and of objective functions with it are one-sided: evaluation 3 has 8 pairs of "
+       "simulated and observed values, the base run 9"},
+      {kCentral, 8, 9, 9, 1, ""},
+      {kCentral, 9, 8, 7, NAN,
+       "it has no derivatives of \"flow\" and of objective functions with it: evaluation 2 has 7"},
+      {kForward, 9, 8, 9, NAN,
+       "it has no derivatives of \"flow\" and of objective functions with it: evaluation 2 has 8"},
+      {kForward, 8, 9, 9, NAN,
+       "it has no derivatives of \"flow\" and of objective functions with it: evaluation 2 has 9"},
+  };
+  for (const auto& [differencing, base, above, below, derivative, warning] : cases) {
+    FunctionEvaluator evaluator([&](const ParameterSet& p) {
+      const std::size_t count = p[0] > 2 ? above : p[0] < 2 ? below : base;
+      EvaluationResult result;
+      result.measureValues = {p[0] + 100.0 * static_cast<double>(count), 2 * p[0], 3 * p[0]};
+      result.objectiveValues = {result.measureValues[0] + 2 * p[0], 3 * p[0]};
+      if (p[0] == 2 || count != base) result.pairs = {{.measure = 0, .count = count}, {.measure = 1, .count = 5}};
+      return result;
+    });
+    const LocalSensitivity found =
+        localSensitivity({differencing, kOfRange, 0.1}, space, evaluator, {}, {}, objectives, measures);
+    EXPECT_NEAR(found.measures.derivatives[0][1], 2, 1e-12);
+    EXPECT_NEAR(found.objectives.derivatives[0][1], 3, 1e-12);
+    EXPECT_EQ(found.plan.differences[0].warnings.size(), warning.empty() ? 0U : 1U) << base << above << below;
+    for (const std::string& text : found.plan.differences[0].warnings) EXPECT_THAT(text, StartsWith(warning));
+    if (std::isnan(derivative)) {
+      EXPECT_TRUE(std::isnan(found.measures.derivatives[0][0]) && std::isnan(found.objectives.derivatives[0][0]));
+      EXPECT_THAT(found.objectives.problems[0][0], StartsWith("evaluation 2 has")) << base << above << below;
+      continue;
+    }
+    EXPECT_NEAR(found.measures.derivatives[0][0], 1, 1e-12) << base << above << below;
+    EXPECT_NEAR(found.objectives.derivatives[0][0], 3, 1e-12) << base << above << below;
+    EXPECT_EQ(found.objectives.problems[0][0], "");
+  }
 }
 
 TEST(LocalSensitivity, OfAFailedBaseSetHasCentralDerivativesOnly) {

@@ -116,9 +116,32 @@ TEST(UncertaintySummary, IsOfTheValuesThatTheModelGets) {
   const UncertaintySummary summary = summariseUncertainty({sample, {}}, space);
   EXPECT_DOUBLE_EQ(summary.parameters[0].mean, (std::exp(-0.1) + 9.0) / 4.0);
   EXPECT_EQ(summary.parameters[1].mean, 2.5);
+  EXPECT_THAT(summary.parameters[1].quantiles, ElementsAre(1, 1, 2, 3, 3)) << "1, 2, 3, 4: values that the model got";
   const std::vector<std::vector<double>> got{{std::exp(-0.1), 2}, {2, 1}, {3, 4}, {4, 3}};
   EXPECT_DOUBLE_EQ(summary.correlations[0][1], correlationMatrix(got)[0][1]);
   EXPECT_EQ(setsOutsideBounds(sample, space), "Sets outside the bounds of a parameter: 3 of 4 (a in 3, b in 1)");
+}
+
+TEST(DistributionWarnings, AreOfMeansOutsideTheBounds) {
+  const SearchSpace space{.names = {"a", "n"},
+                          .lower = {std::log(0.5), 0.0},
+                          .upper = {std::log(4.0), 7.0},  // n is at most 6
+                          .transformation = {TransformationType::logarithmic, TransformationType::integer}};
+  const std::pair<double, const char*> ofIntegers[] = {
+      {0, nullptr},
+      {6.9, nullptr},  // of values around 6
+      {7, "Mean_Value of PARAMETER_2 (n) is 7: outside the bounds 0 to 6"},
+      {-0.5, "Mean_Value of PARAMETER_2 (n) is -0.5: outside the bounds 0 to 6"}};
+  for (const auto& [mean, warning] : ofIntegers) {
+    const UncertaintySettings settings{SamplingType::simpleRandom, 5, {{0.0, 1.0}, {mean, 0.6}}};
+    const std::vector<std::string> found = distributionWarnings(settings, space);
+    EXPECT_EQ(found, warning == nullptr ? std::vector<std::string>{} : std::vector<std::string>{warning}) << mean;
+  }
+  const UncertaintySettings settings{SamplingType::simpleRandom, 5, {{3.0, 1.0}, {2.0, 0.6}}};
+  EXPECT_THAT(
+      distributionWarnings(settings, space),
+      ElementsAre("Mean_Value of PARAMETER_1 (a) is 3, on the model scale 20.0855: outside the bounds 0.5 to 4; "
+                  "the mean of a logarithmic parameter is that of its natural logarithm, ln(3) = 1.09861"));
 }
 
 }  // namespace

@@ -70,7 +70,7 @@ export function hostile(data) {
     data.sensitivity.derivatives[0][0] = data.sensitivity.dimensionless[0][0] = null;
     for (const key of ['parameters', 'outputs', 'ranking']) data.sensitivity[key] = data.sensitivity[key].map(rename);
     data.sensitivity.covariance.names = data.sensitivity.covariance.names.map(rename);
-    data.sensitivity.covariance.leftOut = [kHostile[0]];
+    data.sensitivity.covariance.leftOut = [{ name: kHostile[0], reason: kHostile[1] }];
   }
   Object.assign(data.run, { title: kHostile[0] + kHostile[4], taskName: kHostile[1], message: kHostile[5], notes: [...kHostile] });
   data.failures = kHostile.map((text) => ({ reason: text, count: 1, example: text }));

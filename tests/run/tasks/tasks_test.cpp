@@ -1,5 +1,6 @@
 #include "run/tasks/tasks.h"
 
+#include <algorithm>
 #include <cmath>
 #include <utility>
 
@@ -11,6 +12,7 @@
 #include "refusal.h"
 #include "run/tasks/optimisation_task.h"
 #include "run/tasks/scenario_task.h"
+#include "run/tasks/sensitivity_task.h"
 
 namespace mirevo {
 namespace {
@@ -52,6 +54,25 @@ TEST_F(TasksTest, MultipleRunsAreOneBatchAndComeBackToTheirModelValues) {
   ASSERT_EQ(evaluator_.batches[0].size(), 2U);
   EXPECT_THAT(ToModelScale(space_, evaluator_.batches[0][0]), ElementsAre(0.1, DoubleEq(2.0), 3.5));
   EXPECT_THAT(ToModelScale(space_, evaluator_.batches[0][1]), ElementsAre(-4.0, DoubleEq(412.5), 2.5));
+}
+
+// By the aggregates of 32 bits all perturbed sets fit better.
+TEST_F(TasksTest, ASetThatFitsBetterThanTheBaseSetDoesSoIn64Bits) {
+  objectives_[0].measures = {0};
+  for (const double perturbed : {2.0, 1.5}) {
+    FunctionEvaluator evaluator([&](const ParameterSet& set) {
+      EvaluationResult result = resultOf(set == space_.initial ? 2.0 : 1.9);
+      result.exactMeasures = {set == space_.initial ? 2.0 : perturbed};
+      return result;
+    });
+    TaskContext context{space_, parameters_, measures_, objectives_, evaluator, log_};
+    context.aggregate = [](std::span<const double> values) { return values[0]; };
+    const std::vector<std::string> report = SensitivityTask().run(context).report;
+    EXPECT_EQ(std::count_if(report.begin(), report.end(),
+                            [](const std::string& line) { return line.find("aggregate is 1.5, not 2;") != line.npos; }),
+              perturbed < 2.0 ? 1 : 0);
+    EXPECT_THAT(report, testing::Not(testing::Contains(HasSubstr("aggregate is 1.9"))));
+  }
 }
 
 TEST_F(TasksTest, AScenarioValueWithoutALogarithmIsRefusedByRunAndParameter) {

@@ -107,7 +107,7 @@ function covarianceContent(data: ReportData, covariance: Covariance): Node[] {
     heading('Confidence limits'),
     paragraph('They assume that the set is the best one, that the model is linear between the limits, and that residuals are independent. Residuals that follow one another make them too narrow; the log states their lag-1 correlation and by how much.'),
     table(columns, rows, 'Confidence limits'),
-    ...(covariance.leftOut.length > 0 ? [paragraph(`Left out, as the outputs do not determine them: ${covariance.leftOut.map((name) => `\u2068${shorten(name, 60)}\u2069`).join(', ')}.`)] : []),
+    ...(covariance.leftOut.length > 0 ? [paragraph(`Left out: ${covariance.leftOut.map(({ name, reason }) => `\u2068${shorten(name, 60)}\u2069 (\u2068${reason}\u2069)`).join('; ')}.`)] : []),
     chart(confidencePlan(data, covariance)),
     ...correlationContent(covariance),
   ];
