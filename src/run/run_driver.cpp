@@ -4,6 +4,7 @@
 #include <filesystem>
 #include <new>
 #include <unistd.h>
+#include <utility>
 
 #include <fmt/core.h>
 
@@ -422,8 +423,7 @@ void RunDriver::reportRun() {
 
 void RunDriver::finish(const TaskOutcome& outcome) {
   results_->close();
-  reporter_->settle(*aggregator_);
-  warnOfFewerPairs();
+  logFewerPairs();
   results_->writeTables(outcome.tables);
   const Ending ending{RunStage::finished, outcome.terminationMessage, outcome.terminationMessage};
   if (const auto unwritten = closeResults(ending, outcome.report)) {
@@ -456,6 +456,7 @@ void RunDriver::finish(const TaskOutcome& outcome) {
   if (count == 0) {
     showMessage("Nothing was run: the setup selects no task or no search", {}, MessageType::warning);
   }
+  tellOfBestWithFewerPairs();
   tellOfWarnings();
 }
 
@@ -479,17 +480,24 @@ void RunDriver::logFailures() {
   for (const std::string& line : reporter_->failures().lines()) state_.log.line(line);
 }
 
-/// Says how many evaluations are judged by fewer observations than the initial run; to the user, too, if the best is
-/// one of them.
-void RunDriver::warnOfFewerPairs() {
-  if (!reporter_) return;
+/// Warns of evaluations that are judged by fewer observations than the initial run, and of the best if it is one of
+/// them, which is known when the aggregates are.
+void RunDriver::logFewerPairs() {
+  if (!reporter_ || std::exchange(hasLoggedFewerPairs_, true)) return;
+  reporter_->settle(*aggregator_);
   const std::size_t compared = reporter_->numbersWithPairs().size();
   if (compared < 2) return;
   const std::size_t count = compared - 1;
   state_.log.warning(fmt::format("{} judged by fewer observations than the initial run: the end of {} names {}",
                                  count == 1 ? "1 evaluation is" : fmt::format("{} evaluations are", count),
                                  fileNameOf(results_->table().path()), count == 1 ? "it" : "them"));
-  if (const std::string text = reporter_->fewerPairsOfBest(); !text.empty()) warn(text);
+  if (const std::string text = reporter_->fewerPairsOfBest(); !text.empty()) state_.log.warning(text);
+}
+
+/// After the message that ends an unfinished run, which is the first thing that the user reads.
+void RunDriver::tellOfBestWithFewerPairs() const {
+  const std::string text = reporter_ ? reporter_->fewerPairsOfBest() : std::string();
+  if (!text.empty()) showMessage(text, {}, MessageType::warning);
 }
 
 /// Nothing that goes wrong here may hide why the run ended.
@@ -515,9 +523,10 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
     }
     if (!details.empty()) explained += "\n" + details;
     statistics = keepStatistics();
-    warnOfFewerPairs();
+    logFewerPairs();
     endLogInError(text, details);
     showMessage(explained);
+    tellOfBestWithFewerPairs();
   }
   closeResultsOfEarlyEnd({RunStage::failed, std::string(message), explained}, statistics);
   if (launcher_) launcher_->haltProcesses();  // before the report, which takes time
@@ -525,14 +534,19 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
   return endEarly(message);
 }
 
-/// The message is the log's last record, after an empty one; what explains it stands above. Whatever is warned of
-/// afterwards goes to the user and the message file alone.
+/// What explains the message stands above it.
 void RunDriver::endLogInError(std::string_view message, std::string_view details) {
   const EndingSignalsHeld held;  // or a signal's message could come below
   if (reporter_) logFailures();
   if (!details.empty()) state_.log.line(fmt::format("\n{}", details));
   if (!isAccepted_) state_.log.markRefused();
   state_.log.line(fmt::format("\n{}", message));
+  closeLog();
+}
+
+/// The message that ends the run is the log's last record. Whatever is warned of afterwards goes to the user and the
+/// message file alone.
+void RunDriver::closeLog() {
   signalState.runLogDescriptor = -1;
   state_.log.close();
   state_.log.passWarningsTo([this](std::string_view text) {
@@ -544,12 +558,15 @@ void RunDriver::endLogInError(std::string_view message, std::string_view details
 int RunDriver::endCancelled(std::string_view message) {
   showMessage(message, {}, MessageType::information);
   const std::vector<std::string> statistics = keepStatistics();
-  warnOfFewerPairs();
-  if (!statistics.empty()) {
-    state_.log.line("");
-    state_.log.line(message);
-  }
+  logFewerPairs();
+  tellOfBestWithFewerPairs();
   closeResultsOfEarlyEnd({RunStage::cancelled, std::string(message), std::string(message)}, statistics);
+  {
+    const EndingSignalsHeld held;
+    // The evaluator has written it, and more may have come since.
+    if (state_.log.lastRecord() != message) state_.log.line(fmt::format("\n{}", message));
+    closeLog();
+  }
   if (launcher_) launcher_->haltProcesses();
   reportRun();
   return endEarly(message);
