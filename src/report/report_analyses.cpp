@@ -26,10 +26,11 @@ namespace mirevo {
 namespace {
 
 /// An evaluator that answers with the results in the rows; an evaluation that is not there counts as failed.
-StoredResults resultsOf(const RunConfig& config, std::span<const ResultRow> rows) {
-  std::map<int, EvaluationResult> results;
+StoredResults resultsOf(const RunConfig& config, const SearchSpace& space, std::span<const ResultRow> rows) {
+  std::map<int, StoredResults::Record> records;
   for (const ResultRow& row : rows) {
-    EvaluationResult& result = results[row.number];
+    auto& [values, result] = records[row.number];
+    values = row.parameters;
     result.measureValues = row.measures;
     result.objectiveValues = row.objectives;
     result.aggregate = row.aggregate;
@@ -39,7 +40,7 @@ StoredResults resultsOf(const RunConfig& config, std::span<const ResultRow> rows
   missing.measureValues.assign(config.measures.size(), kFailedRunValue);
   missing.objectiveValues.assign(config.objectives.size(), kFailedRunValue);
   missing.failure.emplace();
-  return {std::move(results), std::move(missing)};
+  return {space, std::move(records), std::move(missing)};
 }
 
 /// The widths of the placeholders as the run had them; a template that is no longer there has none.
@@ -132,7 +133,7 @@ std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, 
                                                        const SearchSpace& space, std::span<const ResultRow> rows) {
   const auto isBase = [](const ResultRow& row) { return row.number == 1 && row.ok; };
   if (std::none_of(rows.begin(), rows.end(), isBase)) return std::nullopt;
-  StoredResults evaluator = resultsOf(config, rows);
+  StoredResults evaluator = resultsOf(config, space, rows);
   ParameterModel parameters(config.parameters, config.constraints);
   const LocalSensitivity found =
       localSensitivity(settings, space, evaluator, ofVariableParameters(fieldWidths(config), config.parameters),
@@ -147,6 +148,7 @@ std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, 
   }
   reported.composite = config.objectives.empty() ? found.measures.composite : found.objectives.composite;
   for (const std::size_t i : found.ranking) reported.ranking.push_back(space.names[i]);
+  reported.ofOtherSets = evaluator.ofOtherSets();
   return reported;
 }
 

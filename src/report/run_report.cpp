@@ -8,7 +8,7 @@
 #include <utility>
 #include <vector>
 
-#include <fmt/core.h>
+#include <fmt/format.h>
 
 #include "common/calendar.h"
 #include "common/clock.h"
@@ -271,6 +271,12 @@ void ReportBuilder::addAnalyses() {
   if (task.hasBands && hasAnalysis) data_.bands = reportedBands(config_, filePrefix_);
   if (task.sensitivity != nullptr) {
     data_.sensitivity = reportedSensitivity(config_, *task.sensitivity, space(), sources_.results.rows);
+  }
+  if (data_.sensitivity && !data_.sensitivity->ofOtherSets.empty()) {
+    note(
+        fmt::format("Evaluations of other parameter sets than a sensitivity analysis of the setup, as it is now, would "
+                    "make are left out, and the derivatives that need them: No. {}.",
+                    fmt::join(data_.sensitivity->ofOtherSets, ", ")));
   }
   if (!isFinished && (analysed || data_.sensitivity)) {
     const std::vector<bool>& ok = data_.evaluations.ok;

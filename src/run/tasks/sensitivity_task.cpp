@@ -194,17 +194,21 @@ TaskOutcome SensitivityTask::run(const TaskContext& context) {
 
 std::optional<TaskOutcome> SensitivityTask::unfinishedOutcome(const TaskContext& context,
                                                               const UnfinishedBatch& made) const {
-  std::map<int, EvaluationResult> results;
-  for (const EvaluationResult& result : made.results) {
-    if (result.ok()) results[result.number] = result;
+  std::map<int, StoredResults::Record> records;
+  int succeeded = 0;
+  for (std::size_t i = 0; i < made.results.size(); ++i) {
+    const EvaluationResult& result = made.results[i];
+    records[result.number] = {ToModelScale(context.space, made.sets[i]), result};
+    if (result.ok()) ++succeeded;
   }
-  if (!results.contains(1) || results.size() < 2) return std::nullopt;  // a derivative needs the base set and another
-  for (const EvaluationResult& result : made.results) results.try_emplace(result.number, result);
+  const auto base = records.find(1);
+  const bool hasBase = base != records.end() && base->second.result.ok();
+  if (!hasBase || succeeded < 2) return std::nullopt;  // a derivative needs the base set and another
   EvaluationResult missing;
   missing.measureValues.assign(context.measures.size(), kFailedRunValue);
   missing.objectiveValues.assign(context.objectives.size(), kFailedRunValue);
   missing.failure = {EvaluationFailure::Kind::notKnown, "the run ended before it was made", {}};
-  StoredResults evaluator(std::move(results), std::move(missing));
+  StoredResults evaluator(context.space, std::move(records), std::move(missing));
   return outcomeOf(context, evaluator);
 }
 
