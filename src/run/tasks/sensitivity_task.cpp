@@ -13,6 +13,7 @@
 #include "evaluation/stored_results.h"
 #include "measures/period_series.h"
 #include "run/tasks/analysis_names.h"
+#include "run/tasks/infeasible_sets.h"
 
 namespace mirevo {
 namespace {
@@ -187,6 +188,9 @@ TaskOutcome SensitivityTask::outcomeOf(const TaskContext& context, Evaluator& ev
 }
 
 TaskOutcome SensitivityTask::run(const TaskContext& context) {
+  const PerturbationPlan plan =
+      planPerturbations(settings, context.space, context.space.initial, {}, context.feasibility);
+  warnOfInfeasibleSets(context, plan.sets, "sets of the analysis", plannedEvaluations(context.space.size()));
   TaskOutcome outcome = outcomeOf(context, context.evaluator);
   logReport(context, outcome.report);
   return outcome;
