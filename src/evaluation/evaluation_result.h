@@ -92,7 +92,7 @@ struct EvaluationResult {
   std::optional<EvaluationFailure> failure;
   std::vector<UnusedObservations> unusedObservations;
   /// One per measure that compares series. Empty once the evaluation has been reported, and for an evaluation of an
-  /// earlier run that is known to have no fewer than the initial run.
+  /// earlier run that is known to have no fewer than the first successful run.
   std::vector<MeasurePairs> pairs;
   std::vector<std::string> warnings;  ///< warnings for the log, one line each
 

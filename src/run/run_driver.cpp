@@ -480,17 +480,12 @@ void RunDriver::logFailures() {
   for (const std::string& line : reporter_->failures().lines()) state_.log.line(line);
 }
 
-/// Warns of evaluations that are judged by fewer observations than the initial run, and of the best if it is one of
-/// them, which is known when the aggregates are.
+/// Warns of evaluations that are judged by fewer observations than the first successful run, and of the best if it is
+/// one of them, which is known when the aggregates are.
 void RunDriver::logFewerPairs() {
   if (!reporter_ || std::exchange(hasLoggedFewerPairs_, true)) return;
   reporter_->settle(*aggregator_);
-  const std::size_t compared = reporter_->numbersWithPairs().size();
-  if (compared < 2) return;
-  const std::size_t count = compared - 1;
-  state_.log.warning(fmt::format("{} judged by fewer observations than the initial run: the end of {} names {}",
-                                 count == 1 ? "1 evaluation is" : fmt::format("{} evaluations are", count),
-                                 fileNameOf(results_->table().path()), count == 1 ? "it" : "them"));
+  if (const std::string text = reporter_->fewerPairsWarning(); !text.empty()) state_.log.warning(text);
   if (const std::string text = reporter_->fewerPairsOfBest(); !text.empty()) state_.log.warning(text);
 }
 

@@ -112,5 +112,21 @@ TEST(EarlyEnd, NamesTheBestSetAsOneWithFewerPairsAfterItsMessageWithWhichTheLogE
   }
 }
 
+TEST(EarlyEnd, TheReportOfARunThatASignalEndedNamesTheBestSetAsOneWithFewerPairs) {
+  const ModelFolder folder;
+  folder.write("model/run.sh",
+               fmt::format("#!/bin/sh\ngrep -Eq '^a = *6 *$' parameters.txt && exec sleep 3600\n{}\n"
+                           "grep -Eq '^a = *5 *$' parameters.txt || exit 0\n"
+                           "head -3 simulated.csv >cut && mv cut simulated.csv\n",
+                           MIREVO_TEST_MODEL),
+               0755);
+  RunningProgram program({folder.writeSetup({.option = 0, .scenarios = {"4, 1, 1", "5, 2, 1", "6, 1, 1"}})});
+  EXPECT_TRUE(folder.reaches("basin.dat", "\n2\tOK\t"));
+  program.send(SIGTERM);
+  program.wait();
+  EXPECT_EQ(RunningProgram({folder / "basin.kdx"}, {}, MIREVO_REPORT).wait().exitCode, 0);
+  EXPECT_EQ(occurrences(folder.read("basin_Report.html"), "The best evaluation, No. 2, is judged by fewer"), 1);
+}
+
 }  // namespace
 }  // namespace mirevo::testing

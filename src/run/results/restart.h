@@ -44,7 +44,7 @@ std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunCon
 
 /// The evaluations of an earlier run by number. `failures`: the reasons of the failed ones. `simulatedValues`: those of
 /// the others, if the task uses them; evaluations without them are left out, and therefore repeated. `pairs`: of the
-/// initial run and of runs that have fewer.
+/// first successful run and of runs that have fewer.
 std::map<int, EarlierEvaluations::Record> earlierRecords(
     EarlierRun& run, const std::map<int, EvaluationFailure>& failures, const PairsByNumber& pairs,
     std::optional<std::map<int, std::vector<double>>> simulatedValues);
