@@ -29,8 +29,6 @@ class EarlierEvaluations final {
   std::optional<EvaluationResult> take(int number, std::span<const double> set);
 
  private:
-  /// Whether an earlier run had this value of parameter k for the search-scale value `searched`, bit for bit.
-  bool isSame(double earlier, double value, std::size_t k, double searched) const;
   void requireSameValues(int number, std::span<const double> earlier, std::span<const double> set) const;
 
   SearchSpace space_;

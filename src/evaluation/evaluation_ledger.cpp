@@ -21,9 +21,9 @@ void EvaluationLedger::begin(std::span<const ParameterSet> sets, DispatchMode mo
 }
 
 void EvaluationLedger::replay(std::size_t place, EvaluationResult result) {
-  const PairsFound found = initialPairs_.take(result);
+  PairsFound found = pairComparison_.take(result);
   observer_.evaluationReplayed(sets_[place], result);
-  tell(found);
+  tell(std::move(found));
   store(place, std::move(result));
 }
 
@@ -40,7 +40,7 @@ void EvaluationLedger::store(std::size_t place, EvaluationResult result) {
 std::optional<std::size_t> EvaluationLedger::takeNext() {
   while (next_ < sets_.size() && isFinished_[next_]) ++next_;
   if (next_ == sets_.size()) return std::nullopt;
-  if (openCount_ > 0 && initialPairs_.isAwaited()) return std::nullopt;
+  if (openCount_ > 0 && pairComparison_.isAwaited()) return std::nullopt;
   ++openCount_;
   return next_++;
 }
@@ -68,7 +68,7 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
   if (earlier_ != nullptr) known = earlier_->take(result.number, sets_[place]);
   PairsFound found;
   if (!known) {
-    found = initialPairs_.take(result);
+    found = pairComparison_.take(result);
     observer_.recordEvaluation(sets_[place], result);
   }
   observer_.message(progress::completedMessage(result.number, outcome));
@@ -78,12 +78,14 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
     return replay(place, std::move(*known));
   }
   observer_.evaluationFinished(sets_[place], result);
-  tell(found);
+  tell(std::move(found));
   store(place, std::move(result));
 }
 
-void EvaluationLedger::tell(const PairsFound& found) {
-  if (!found.isEmpty()) observer_.pairsFound(found);
+void EvaluationLedger::tell(PairsFound found) {
+  if (found.isEmpty()) return;
+  for (FewerPairs& fewer : found.fewer) fewer.isWarnedOf = warnedOf_.contains({fewer.number, fewer.measure});
+  observer_.pairsFound(found);
 }
 
 void EvaluationLedger::warnOfUnusedObservations(const EvaluationResult& result) {
@@ -91,6 +93,7 @@ void EvaluationLedger::warnOfUnusedObservations(const EvaluationResult& result) 
     const auto [fewest, isFirst] = fewestUsed_.try_emplace(unused.measure, unused.usedCount);
     if (!isFirst && fewest->second <= unused.usedCount) continue;
     fewest->second = unused.usedCount;
+    warnedOf_.emplace(result.number, unused.measure);
     observer_.warning(progress::nameOfEvaluation(result.number) + ": " + unused.text);
   }
 }

@@ -3,6 +3,7 @@
 #include <cstddef>
 #include <map>
 #include <optional>
+#include <set>
 #include <span>
 #include <string_view>
 #include <utility>
@@ -15,7 +16,7 @@
 #include "evaluation/evaluation_result.h"
 #include "evaluation/evaluator.h"
 #include "evaluation/failed_run_policy.h"
-#include "evaluation/initial_pairs.h"
+#include "evaluation/pair_comparison.h"
 #include "measures/objective_functions.h"
 
 namespace mirevo {
@@ -26,25 +27,25 @@ class EvaluationLedger final {
  public:
   /// `earlier`: evaluations that are not repeated; may be null.
   EvaluationLedger(EvaluationObserver& observer, FailedRunPolicy& failedRuns, EarlierEvaluations* earlier = nullptr,
-                   EqualMeasures equalMeasures = {}, InitialPairs initialPairs = {})
+                   EqualMeasures equalMeasures = {}, PairComparison pairComparison = {})
       : observer_(observer),
         failedRuns_(failedRuns),
         earlier_(earlier),
         equalMeasures_(std::move(equalMeasures)),
-        initialPairs_(std::move(initialPairs)) {}
+        pairComparison_(std::move(pairComparison)) {}
 
   /// Opens the next batch of the run; `place` below is the 0-based index of a set in it.
   /// Sets that an earlier run has evaluated get their results at once, unless `mode` requires their model runs. Throws
   /// FatalError when the failed-run limit is exceeded, and if an earlier evaluation was of another set.
   void begin(std::span<const ParameterSet> sets, DispatchMode mode);
-  /// The next set, in order, that has no result yet; empty when all are taken, and as long as a model run is to show
-  /// how many pairs the initial run has, of which the next ones need a share.
+  /// The next set, in order, that has no result yet; empty when all are taken, and as long as a model run may become
+  /// the first successful one, by which the next ones are judged.
   std::optional<std::size_t> takeNext();
   const ParameterSet& set(std::size_t place) const { return sets_[place]; }
   /// The set's number in the run, from 1.
   int numberOf(std::size_t place) const { return evaluationCount_ + static_cast<int>(place) + 1; }
   /// The pairs that the model run of the set taken last needs.
-  RequiredPairs requiredPairs() const { return initialPairs_.required(); }
+  RequiredPairs requiredPairs() const { return pairComparison_.required(); }
   /// To be called when the model run of the set has started.
   void markInitiated(std::size_t place);
   /// Takes the result of a set; its number is filled in here. `leftBehind`: what the launcher says of processes that
@@ -64,7 +65,7 @@ class EvaluationLedger final {
  private:
   /// Warns of each measure for which this run has values for fewer observations than any run before.
   void warnOfUnusedObservations(const EvaluationResult& result);
-  void tell(const PairsFound& found);
+  void tell(PairsFound found);
   void replay(std::size_t place, EvaluationResult result);
   void store(std::size_t place, EvaluationResult result);
   std::vector<EvaluationResult> close();
@@ -73,17 +74,18 @@ class EvaluationLedger final {
   FailedRunPolicy& failedRuns_;
   EarlierEvaluations* earlier_;
   EqualMeasures equalMeasures_;
-  InitialPairs initialPairs_;
+  PairComparison pairComparison_;
   bool isFinalRun_ = false;
   std::vector<ParameterSet> sets_;  ///< the ledger's own: an unfinished batch outlives its caller
   std::vector<EvaluationResult> results_;
-  std::vector<bool> isFinished_;                   ///< whether a set has its result
-  std::size_t next_ = 0;                           ///< first set that was not taken
-  std::size_t finishedCount_ = 0;                  ///< sets that have a result
-  std::size_t openCount_ = 0;                      ///< sets that were taken and have no result
-  int evaluationCount_ = 0;                        ///< sets of the batches before this one
-  std::map<std::size_t, std::size_t> fewestUsed_;  ///< by measure, the fewest observations used of which a warning was
-                                                   ///< given
+  std::vector<bool> isFinished_;                    ///< whether a set has its result
+  std::size_t next_ = 0;                            ///< first set that was not taken
+  std::size_t finishedCount_ = 0;                   ///< sets that have a result
+  std::size_t openCount_ = 0;                       ///< sets that were taken and have no result
+  int evaluationCount_ = 0;                         ///< sets of the batches before this one
+  std::set<std::pair<int, std::size_t>> warnedOf_;  ///< evaluations and measures with unused observations
+  std::map<std::size_t, std::size_t> fewestUsed_;   ///< by measure, the fewest observations used of which a warning was
+                                                    ///< given
 };
 
 /// Evaluator::settleAggregates() of the evaluators that run models; reports the scales found as messages.

@@ -5,7 +5,7 @@
 
 #include "common/parameter_set.h"
 #include "evaluation/evaluation_result.h"
-#include "evaluation/initial_pairs.h"
+#include "evaluation/pair_comparison.h"
 
 namespace mirevo {
 

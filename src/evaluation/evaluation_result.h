@@ -99,7 +99,8 @@ struct EvaluationResult {
   std::optional<EvaluationFailure> failure;
   std::vector<UnusedObservations> unusedObservations;
   /// One per measure that compares series. Once the evaluation has been reported, and for one of an earlier run, only
-  /// those of the initial run, of runs with other pairs, and of runs that ended before the initial one was known.
+  /// those of the first successful run, of runs with other pairs, and of runs that ended before the first successful
+  /// one was known.
   std::vector<MeasurePairs> pairs;
   std::vector<std::string> warnings;  ///< warnings for the log, one line each
 

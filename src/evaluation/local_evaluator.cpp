@@ -11,7 +11,7 @@ LocalEvaluator::LocalEvaluator(ModelRunner& runner, EvaluationObserver& observer
                                int slotCount, EarlierEvaluations* earlier)
     : runner_(runner),
       observer_(observer),
-      ledger_(observer, failedRuns, earlier, runner.equalMeasures(), runner.initialPairs()),
+      ledger_(observer, failedRuns, earlier, runner.equalMeasures(), runner.pairComparison()),
       slots_(static_cast<std::size_t>(slotCount)) {
   assert(slotCount > 0);
 }

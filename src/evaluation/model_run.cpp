@@ -190,14 +190,19 @@ EqualMeasures ModelRunner::equalMeasures() const {
           std::move(names), std::move(written), std::move(read)};
 }
 
-InitialPairs ModelRunner::initialPairs() const {
+PairComparison ModelRunner::pairComparison() const {
   std::vector<std::string> names;
   bool comparesSeries = false;
-  for (const OutputMeasure& measure : description_.measures) {
+  PairRules rules;
+  rules.requiresShare = description_.minimumCoverage > 0.0;
+  for (std::size_t i = 0; i < description_.measures.size(); ++i) {
+    const OutputMeasure& measure = description_.measures[i];
     names.push_back(measure.name);
-    comparesSeries = comparesSeries || measure.interfaceType == InterfaceType::timeSeries;
+    if (measure.interfaceType != InterfaceType::timeSeries) continue;
+    comparesSeries = true;
+    rules.requiresProof = rules.requiresProof || !series_.needsPairs(i);
   }
-  return comparesSeries ? InitialPairs(std::move(names), description_.minimumCoverage > 0.0) : InitialPairs();
+  return comparesSeries ? PairComparison(std::move(names), rules) : PairComparison();
 }
 
 std::string ModelRunner::slotPath(const std::string& baseFile, int slot) const {
@@ -402,7 +407,8 @@ std::optional<EvaluationFailure> ModelRunner::readSeriesMeasure(int slot, std::s
   }
   try {
     // A model that stopped early is a failed evaluation; a setup whose period no model run can match ends the run.
-    if (series_.needsPairs(i) && !hasPairs(measure, description_.period, simulation, series_.observation(i))) {
+    const bool canHavePairs = series_.needsPairs(i) || requiredPairs_.anyHasSucceeded;
+    if (canHavePairs && !hasPairs(measure, description_.period, simulation, series_.observation(i))) {
       return makeFailure(Kind::resultsNotWritten,
                          fmt::format("{}: item No. {} ({}) has no value at any observation time in the evaluation "
                                      "period",
@@ -425,17 +431,17 @@ std::optional<EvaluationFailure> ModelRunner::readSeriesMeasure(int slot, std::s
 }
 
 std::optional<EvaluationFailure> ModelRunner::findLackOfPairs(std::size_t i, std::size_t count, int slot) const {
-  if (requiredPairs_.initialCounts.empty()) return std::nullopt;
-  const std::size_t initial = requiredPairs_.initialCounts.at(i);
+  if (requiredPairs_.firstCounts.empty()) return std::nullopt;
+  const std::size_t ofFirst = requiredPairs_.firstCounts.at(i);
   // A quotient is rounded to the number that the setup gives, a product need not be: 3 of 30 pairs are 0.1.
-  if (initial == 0 || static_cast<double>(count) / static_cast<double>(initial) >= description_.minimumCoverage) {
+  if (ofFirst == 0 || static_cast<double>(count) / static_cast<double>(ofFirst) >= description_.minimumCoverage) {
     return std::nullopt;
   }
   return makeFailure(Kind::tooFewPairs,
                      fmt::format("output measure \"{}\" has {} pairs of simulated and observed values, {} in the "
-                                 "initial run, No. {}: a share below Minimum_Coverage = {}",
-                                 trimTrailing(description_.measures[i].name), count, initial,
-                                 requiredPairs_.initialNumber, formatReal(description_.minimumCoverage)),
+                                 "first successful run, No. {}: a share below Minimum_Coverage = {}",
+                                 trimTrailing(description_.measures[i].name), count, ofFirst,
+                                 requiredPairs_.firstNumber, formatReal(description_.minimumCoverage)),
                      slot);
 }
 

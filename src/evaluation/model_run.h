@@ -7,7 +7,7 @@
 
 #include "evaluation/equal_measures.h"
 #include "evaluation/evaluation_result.h"
-#include "evaluation/initial_pairs.h"
+#include "evaluation/pair_comparison.h"
 #include "evaluation/saved_files.h"
 #include "evaluation/shown_runs.h"
 #include "measures/measure_statistics.h"
@@ -29,7 +29,7 @@ struct ModelDescription {
   std::vector<OutputMeasure> measures;
   std::string measureFile;  ///< output-measure file; empty when no measure is of interface type 1
   EvaluationPeriod period;
-  double minimumCoverage = 0.0;  ///< share of the initial run's pairs below which a run fails
+  double minimumCoverage = 0.0;  ///< share of the first successful run's pairs below which a run fails
   std::vector<ObjectiveFunction> objectives;
   std::vector<std::string> savedFiles;  ///< files kept from every model run
   std::string savedFolder;              ///< where they are kept
@@ -85,7 +85,7 @@ class ModelRunner final {
   /// A check for a model that ignores its parameters, for the evaluations of a run.
   EqualMeasures equalMeasures() const;
   /// A comparison of the pairs of model runs, for the evaluations of a run.
-  InitialPairs initialPairs() const;
+  PairComparison pairComparison() const;
   /// templateDoubts() of all templates.
   const std::vector<std::string>& templateWarnings() const { return templateWarnings_; }
 

@@ -1,7 +1,9 @@
 #include "parameters/search_space.h"
 
+#include <bit>
 #include <cassert>
 #include <cmath>
+#include <cstdint>
 
 #include <fmt/core.h>
 
@@ -98,6 +100,25 @@ std::vector<double> ToModelScale(const SearchSpace& space, std::span<const doubl
   std::vector<double> values(space.size());
   for (std::size_t k = 0; k < values.size(); ++k) values[k] = toModelScale(space, k, set[k]);
   return values;
+}
+
+std::optional<std::size_t> findOtherValue(const SearchSpace& space, std::span<const double> set,
+                                          std::span<const double> earlier) {
+  assert(set.size() == space.size() && earlier.size() == space.size());
+  for (std::size_t k = 0; k < space.size(); ++k) {
+    const auto isSame = [value = earlier[k]](double other) {
+      // A difference in the last digit is a sign of another sequence of random numbers.
+      return std::bit_cast<std::uint64_t>(other) == std::bit_cast<std::uint64_t>(value);
+    };
+    bool failed = false;  // earlier versions had exp(ln x) for a given value, too
+    if (isSame(toModelScale(space, k, set[k])) ||
+        isSame(TransformParameterValue(set[k], space.lower[k], space.transformation[k], TransformDirection::backward,
+                                       failed))) {
+      continue;
+    }
+    return k;
+  }
+  return std::nullopt;
 }
 
 }  // namespace mirevo

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <map>
+#include <optional>
 #include <span>
 #include <string>
 #include <utility>
@@ -43,5 +44,10 @@ double toModelScale(const SearchSpace& space, std::size_t k, double value);
 
 /// The values of a set on the model scale, in the order of the set.
 std::vector<double> ToModelScale(const SearchSpace& space, std::span<const double> set);
+
+/// The first parameter of which an earlier run of `set` would have had another value than `earlier` has, bit for bit;
+/// empty if that was this set. `earlier` is on the model scale.
+std::optional<std::size_t> findOtherValue(const SearchSpace& space, std::span<const double> set,
+                                          std::span<const double> earlier);
 
 }  // namespace mirevo

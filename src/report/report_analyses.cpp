@@ -27,10 +27,12 @@ namespace mirevo {
 namespace {
 
 /// An evaluator that answers with the results in the rows; an evaluation that is not there counts as failed.
-StoredResults resultsOf(const RunConfig& config, std::span<const ResultRow> rows, const PairsByNumber& pairs) {
-  std::map<int, EvaluationResult> results;
+StoredResults resultsOf(const RunConfig& config, const SearchSpace& space, std::span<const ResultRow> rows,
+                        const PairsByNumber& pairs) {
+  std::map<int, StoredResults::Record> records;
   for (const ResultRow& row : rows) {
-    EvaluationResult& result = results[row.number];
+    auto& [values, result] = records[row.number];
+    values = row.parameters;
     result.measureValues = row.measures;
     result.objectiveValues = row.objectives;
     result.aggregate = row.aggregate;
@@ -41,7 +43,7 @@ StoredResults resultsOf(const RunConfig& config, std::span<const ResultRow> rows
   missing.measureValues.assign(config.measures.size(), kFailedRunValue);
   missing.objectiveValues.assign(config.objectives.size(), kFailedRunValue);
   missing.failure.emplace();
-  return {std::move(results), std::move(missing)};
+  return {space, std::move(records), std::move(missing)};
 }
 
 /// The widths of the placeholders as the run had them; a template that is no longer there has none.
@@ -150,7 +152,7 @@ std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, 
                                                        const PairsByNumber& pairs) {
   const auto isBase = [](const ResultRow& row) { return row.number == 1 && row.ok; };
   if (std::none_of(rows.begin(), rows.end(), isBase)) return std::nullopt;
-  StoredResults evaluator = resultsOf(config, rows, pairs);
+  StoredResults evaluator = resultsOf(config, space, rows, pairs);
   ParameterModel parameters(config.parameters, config.constraints);
   const LocalSensitivity found =
       localSensitivity(settings, space, evaluator, parameterFields(parameters, fieldWidths(config)),
@@ -165,6 +167,7 @@ std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, 
   }
   reported.composite = config.objectives.empty() ? found.measures.composite : found.objectives.composite;
   for (const std::size_t i : found.ranking) reported.ranking.push_back(space.names[i]);
+  reported.ofOtherSets = evaluator.ofOtherSets();
   return reported;
 }
 

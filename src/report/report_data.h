@@ -116,6 +116,7 @@ struct ReportedSensitivity {
   std::vector<double> composite;
   bool isOfObservations = false;  ///< the composite, rather than of the objective functions or output measures
   std::vector<std::string> ranking;
+  std::vector<int> ofOtherSets;  ///< evaluations that are left out, as the setup has other sets for them
   std::optional<ReportedCovariance> covariance;
 };
 

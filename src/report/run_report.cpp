@@ -8,7 +8,7 @@
 #include <utility>
 #include <vector>
 
-#include <fmt/core.h>
+#include <fmt/format.h>
 
 #include "common/calendar.h"
 #include "common/clock.h"
@@ -18,6 +18,7 @@
 #include "common/run_files.h"
 #include "common/version.h"
 #include "evaluation/chosen_evaluations.h"
+#include "evaluation/pair_comparison.h"
 #include "measures/period_series.h"
 #include "parameters/parameter_model.h"
 #include "report/page/page_template.h"
@@ -207,21 +208,23 @@ PairsByNumber ReportBuilder::pairsOfRuns() const {
   return readPairs(filePrefix_, config_.task->facts().resultFiles).content.value_or(PairsByNumber{});
 }
 
-/// In a run that has come to its end the closing lines of its results say so.
+/// In a run that has come to its end, other than by a signal, the closing lines of its results say so.
 void ReportBuilder::noteFewerPairsOfBest() {
-  if (best_ == nullptr || !data_.summary.empty()) return;
+  if (best_ == nullptr) return;
+  const std::string sentence = bestHasFewerPairs(best_->number);
+  const bool isSaid = std::any_of(data_.summary.begin(), data_.summary.end(),
+                                  [&](const std::string& line) { return line.find(sentence) != std::string::npos; });
+  if (isSaid) return;
   const PairsByNumber pairs = pairsOfRuns();
   const auto ofBest = pairs.find(best_->number);
   if (ofBest == pairs.end()) return;
   for (const MeasurePairs& found : ofBest->second) {
-    const std::vector<MeasurePairs>& initial = pairs.begin()->second;
-    const auto same = std::find_if(initial.begin(), initial.end(),
+    const std::vector<MeasurePairs>& first = pairs.begin()->second;
+    const auto same = std::find_if(first.begin(), first.end(),
                                    [&found](const MeasurePairs& other) { return other.measure == found.measure; });
-    if (same == initial.end() || found.count >= same->count || found.measure >= config_.measures.size()) continue;
-    note(fmt::format(
-        "The best evaluation, No. {}, is judged by fewer observations than the initial run: output "
-        "measure \"{}\" has {} pairs, {} in the initial run, No. {}.",
-        best_->number, config_.measures[found.measure].name, found.count, same->count, pairs.begin()->first));
+    if (same == first.end() || found.count >= same->count || found.measure >= config_.measures.size()) continue;
+    note(fmt::format("{}: output measure \"{}\" has {} pairs, {} in the first successful run, No. {}.", sentence,
+                     config_.measures[found.measure].name, found.count, same->count, pairs.begin()->first));
   }
 }
 
@@ -289,6 +292,12 @@ void ReportBuilder::addAnalyses() {
   if (task.sensitivity != nullptr) {
     data_.sensitivity = reportedSensitivity(config_, *task.sensitivity, space(), sources_.results.rows, pairsOfRuns());
   }
+  if (data_.sensitivity && !data_.sensitivity->ofOtherSets.empty()) {
+    note(
+        fmt::format("Evaluations of other parameter sets than a sensitivity analysis of the setup, as it is now, would "
+                    "make are left out, and the derivatives that need them: No. {}.",
+                    fmt::join(data_.sensitivity->ofOtherSets, ", ")));
+  }
   if (!isFinished && (analysed || data_.sensitivity)) {
     const std::vector<bool>& ok = data_.evaluations.ok;
     note(fmt::format("The statistics are those of an unfinished run: of {} of {} evaluations.",
@@ -330,8 +339,7 @@ bool writeReport(const RunConfig& config, const std::string& filePrefix, std::st
   return false;
 }
 
-bool isReportOf(const std::string& path, std::string_view task) {
-  std::string reason;
+bool isReportOf(const std::string& path, std::string_view task, std::string& reason) {
   const auto text = readTextFile(path, reason);
   return text && text->find(fmt::format(R"("task":"{}","taskName":)", task)) != std::string::npos;
 }

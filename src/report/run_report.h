@@ -17,6 +17,6 @@ std::optional<ReportData> buildReport(const RunConfig& config, const std::string
 bool writeReport(const RunConfig& config, const std::string& filePrefix, std::string& reason) noexcept;
 
 /// Whether the file is a report on a run of that task.
-bool isReportOf(const std::string& path, std::string_view task);
+bool isReportOf(const std::string& path, std::string_view task, std::string& reason);
 
 }  // namespace mirevo

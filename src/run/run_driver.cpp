@@ -7,6 +7,7 @@
 #include <filesystem>
 #include <new>
 #include <unistd.h>
+#include <utility>
 
 #include <fmt/core.h>
 
@@ -247,10 +248,14 @@ void RunDriver::openResults() {
 /// can be made again at any time; one of another task is kept.
 void RunDriver::putEarlierReportAside() {
   const std::string path = runFilePath(filePrefix_, run_files::kReport);
-  if (results_->earlierEvaluations() != nullptr && isReportOf(path, config_.task->facts().name.name)) {
-    std::error_code ignored;
+  std::string reason;
+  std::error_code ignored;
+  if (results_->earlierEvaluations() != nullptr && isReportOf(path, config_.task->facts().name.name, reason)) {
     std::filesystem::remove(path, ignored);
   } else {
+    if (!reason.empty() && std::filesystem::exists(path, ignored)) {
+      state_.log.warning(fmt::format("{}: {}. Of which task it is is not known", path, reason));
+    }
     keepEarlierFile(path, state_.log);
   }
 }
@@ -438,8 +443,7 @@ void RunDriver::reportRun() {
 
 void RunDriver::finish(const TaskOutcome& outcome) {
   results_->close();
-  reporter_->settle(*aggregator_);
-  warnOfFewerPairs();
+  logFewerPairs();
   results_->writeTables(outcome.tables, state_.log);
   const Ending ending{RunStage::finished, outcome.terminationMessage, outcome.terminationMessage};
   if (const auto unwritten = closeResults(ending, outcome.report)) {
@@ -472,6 +476,7 @@ void RunDriver::finish(const TaskOutcome& outcome) {
   if (count == 0) {
     showMessage("Nothing was run: the setup selects no task or no search", {}, MessageType::warning);
   }
+  tellOfBestWithFewerPairs();
   tellOfWarnings();
 }
 
@@ -495,16 +500,19 @@ void RunDriver::logFailures() {
   for (const std::string& line : reporter_->failures().lines()) state_.log.line(line);
 }
 
-/// Says how many evaluations are judged by fewer observations than the initial run; to the user, too, if the best is
-/// one of them.
-void RunDriver::warnOfFewerPairs() {
-  if (!reporter_) return;
-  const std::size_t count = reporter_->countOfFewerPairs();
-  if (count == 0) return;
-  state_.log.warning(fmt::format("{} judged by fewer observations than the initial run: the end of {} names {}",
-                                 count == 1 ? "1 evaluation is" : fmt::format("{} evaluations are", count),
-                                 fileNameOf(results_->table().path()), count == 1 ? "it" : "them"));
-  if (const std::string text = reporter_->fewerPairsOfBest(); !text.empty()) warn(text);
+/// Warns of evaluations that are judged by fewer observations than the first successful run, and of the best if it is
+/// one of them, which is known when the aggregates are.
+void RunDriver::logFewerPairs() {
+  if (!reporter_ || std::exchange(hasLoggedFewerPairs_, true)) return;
+  reporter_->settle(*aggregator_);
+  if (const std::string text = reporter_->fewerPairsWarning(); !text.empty()) state_.log.warning(text);
+  if (const std::string text = reporter_->fewerPairsOfBest(); !text.empty()) state_.log.warning(text);
+}
+
+/// After the message that ends an unfinished run, which is the first thing that the user reads.
+void RunDriver::tellOfBestWithFewerPairs() const {
+  const std::string text = reporter_ ? reporter_->fewerPairsOfBest() : std::string();
+  if (!text.empty()) showMessage(text, {}, MessageType::warning);
 }
 
 /// Nothing that goes wrong here may hide why the run ended.
@@ -530,9 +538,10 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
     }
     if (!details.empty()) explained += "\n" + details;
     statistics = keepStatistics();
-    warnOfFewerPairs();
+    logFewerPairs();
     endLogInError(text, details);
     showMessage(explained);
+    tellOfBestWithFewerPairs();
   }
   closeResultsOfEarlyEnd({RunStage::failed, std::string(message), explained}, statistics);
   if (launcher_) launcher_->haltProcesses();  // before the report, which takes time
@@ -540,14 +549,19 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
   return endEarly(message);
 }
 
-/// The message is the log's last record, after an empty one; what explains it stands above. Whatever is warned of
-/// afterwards goes to the user and the message file alone.
+/// What explains the message stands above it.
 void RunDriver::endLogInError(std::string_view message, std::string_view details) {
   const EndingSignalsHeld held;  // or a signal's message could come below
   if (reporter_) logFailures();
   if (!details.empty()) state_.log.line(fmt::format("\n{}", details));
   if (!hasBegun_) state_.log.markAsOfNoRun(isSetupRead_ ? "The run did not begin" : "The setup is refused");
   state_.log.line(fmt::format("\n{}", message));
+  closeLog();
+}
+
+/// The message that ends the run is the log's last record. Whatever is warned of afterwards goes to the user and the
+/// message file alone.
+void RunDriver::closeLog() {
   signalState.runLogDescriptor = -1;
   state_.log.close();
   state_.log.passWarningsTo([this](std::string_view text) {
@@ -559,12 +573,15 @@ void RunDriver::endLogInError(std::string_view message, std::string_view details
 int RunDriver::endCancelled(std::string_view message) {
   showMessage(message, {}, MessageType::information);
   const std::vector<std::string> statistics = keepStatistics();
-  warnOfFewerPairs();
-  if (!statistics.empty()) {
-    state_.log.line("");
-    state_.log.line(message);
-  }
+  logFewerPairs();
+  tellOfBestWithFewerPairs();
   closeResultsOfEarlyEnd({RunStage::cancelled, std::string(message), std::string(message)}, statistics);
+  {
+    const EndingSignalsHeld held;
+    // The evaluator has written it, and more may have come since.
+    if (state_.log.lastRecord() != message) state_.log.line(fmt::format("\n{}", message));
+    closeLog();
+  }
   if (launcher_) launcher_->haltProcesses();
   reportRun();
   return endEarly(message);

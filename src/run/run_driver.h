@@ -75,9 +75,11 @@ class RunDriver final {
   void reportRun();
   void finish(const TaskOutcome& outcome);
   void logFailures();
-  void warnOfFewerPairs();
+  void logFewerPairs();
+  void tellOfBestWithFewerPairs() const;
   int endInError(std::string_view message, std::string_view detail);
   void endLogInError(std::string_view message, std::string_view details);
+  void closeLog();
   int endCancelled(std::string_view message);
   /// Closes the log, halts the model processes, leaves the job and ends the progress.
   int endEarly(std::string_view ending);
@@ -104,6 +106,7 @@ class RunDriver final {
   std::unique_ptr<ModelRunner> runner_;
   std::unique_ptr<Evaluator> evaluator_;
   std::optional<TaskOutcome> outcome_;  ///< of the task, once it has come to its end
+  bool hasLoggedFewerPairs_ = false;
 };
 
 }  // namespace mirevo

@@ -12,7 +12,7 @@
 namespace mirevo {
 namespace {
 
-constexpr std::size_t kMostLinesOfFewerPairs = 20;
+constexpr std::size_t kMostShownWithFewerPairs = 20;
 
 }  // namespace
 
@@ -67,55 +67,58 @@ void RunReporter::evaluationReplayed(std::span<const double> set, const Evaluati
 }
 
 void RunReporter::pairsFound(const PairsFound& found) {
-  if (found.initialNumber != 0) initialRun_ = found.initialNumber;
-  for (const std::string& line : found.initialLines) state_.log.line(line);
+  if (found.firstNumber != 0) firstSuccess_ = found.firstNumber;
+  for (const std::string& line : found.firstLines) state_.log.line(line);
   for (const FewerPairs& fewer : found.fewer) {
-    state_.log.line(fmt::format("   {}: {}", progress::nameOfEvaluation(fewer.number), fewer.text));
-    fewer_.insert_or_assign({fewer.number, fewer.measure}, fewer);
+    if (!fewer.isWarnedOf) {
+      state_.log.line(fmt::format("   {}: {}", progress::nameOfEvaluation(fewer.number), fewer.text));
+    }
+    fewer_[fewer.number].insert_or_assign(fewer.measure, fewer.text);
   }
   others_.insert(found.others.begin(), found.others.end());
 }
 
+std::string RunReporter::fewerPairsText(int number) const {
+  const auto found = fewer_.find(number);
+  if (found == fewer_.end()) return {};
+  std::string text;
+  for (const auto& [measure, part] : found->second) text.append(text.empty() ? "" : "; ").append(part);
+  return text;
+}
+
 std::vector<std::string> RunReporter::fewerPairsLines() const {
   std::vector<std::string> lines;
-  std::set<int> shown;
-  std::set<int> all;
-  for (const auto& [key, fewer] : fewer_) {
-    all.insert(key.first);
-    if (lines.size() == kMostLinesOfFewerPairs) continue;
-    shown.insert(key.first);
-    lines.push_back(fmt::format("Fewer pairs: evaluation {}: {}", fewer.number, fewer.text));
+  for (const auto& [number, parts] : fewer_) {
+    if (lines.size() == kMostShownWithFewerPairs) break;
+    lines.push_back(fmt::format("Fewer pairs: evaluation {}: {}", number, fewerPairsText(number)));
   }
-  if (all.size() > shown.size()) {
-    lines.push_back(fmt::format("Fewer pairs: {} more evaluations{}", all.size() - shown.size(),
+  if (const std::size_t more = fewer_.size() - lines.size(); more > 0) {
+    lines.push_back(fmt::format("Fewer pairs: {} more evaluation{}{}", more, more == 1 ? "" : "s",
                                 pairs_ == nullptr ? "" : ", see " + fileNameOf(pairs_->path())));
   }
   return lines;
 }
 
+std::string RunReporter::fewerPairsWarning() const {
+  if (fewer_.empty()) return {};
+  const bool isOne = fewer_.size() == 1;
+  const char* const named = fewer_.size() > kMostShownWithFewerPairs ? "the first of them" : isOne ? "it" : "them";
+  return fmt::format("{} judged by fewer observations than the first successful run: the end of {} names {}",
+                     isOne ? "1 evaluation is" : fmt::format("{} evaluations are", fewer_.size()),
+                     fileNameOf(results_.path()), named);
+}
+
 std::string RunReporter::fewerPairsOfBest() const {
-  if (!best()) return {};
-  std::string found;
-  for (const auto& [key, fewer] : fewer_) {
-    if (key.first == best()->number) found.append(found.empty() ? "" : "; ").append(fewer.text);
-  }
-  if (found.empty()) return {};
-  return fmt::format("The best evaluation, No. {}, is judged by fewer observations than the initial run: {}",
-                     best()->number, found);
+  const std::string text = best() ? fewerPairsText(best()->number) : std::string();
+  return text.empty() ? text : fmt::format("{}: {}", bestHasFewerPairs(best()->number), text);
 }
 
 std::set<int> RunReporter::numbersWithPairs() const {
-  if (initialRun_ == 0) return {};
+  if (firstSuccess_ == 0) return {};
   std::set<int> numbers = others_;
-  numbers.insert(initialRun_);
-  for (const auto& [key, fewer] : fewer_) numbers.insert(key.first);
+  numbers.insert(firstSuccess_);
+  for (const auto& [number, parts] : fewer_) numbers.insert(number);
   return numbers;
-}
-
-std::size_t RunReporter::countOfFewerPairs() const {
-  std::set<int> numbers;
-  for (const auto& [key, fewer] : fewer_) numbers.insert(key.first);
-  return numbers.size();
 }
 
 void RunReporter::count(const std::vector<double>& parameterValues, const EvaluationResult& result,

@@ -25,8 +25,8 @@ namespace mirevo {
 /// The reporting of a run: log, progress, result file and the file of failed runs.
 class RunReporter final : public EvaluationObserver {
  public:
-  /// The result file must be open; all must outlive the reporter. `simulatedValues` receives those of every evaluation;
-  /// and `pairs` those that are to be kept; both may be null.
+  /// The result file must be open; all must outlive the reporter. `simulatedValues` receives the
+  /// simulated values of every successful evaluation, `pairs` the pairs that are to be kept; both may be null.
   RunReporter(RunState& state, ResultFile& results, FailedRunFile& failedRuns, const SearchSpace& space,
               SimulatedValuesFile* simulatedValues = nullptr, PairsFile* pairs = nullptr);
 
@@ -53,16 +53,16 @@ class RunReporter final : public EvaluationObserver {
   /// The number of the initial evaluation; empty before an evaluation has succeeded.
   const std::optional<int>& initial() const { return initial_.number(); }
 
-  /// The evaluations that have fewer pairs than the initial run: the first of them a line each, and how many more.
-  /// Empty without any.
+  /// The evaluations that have fewer pairs than the first successful run: one line for each of the first of them, and
+  /// how many more. Empty without any.
   std::vector<std::string> fewerPairsLines() const;
+  /// A sentence that says how many there are, and where those lines are; empty without any.
+  std::string fewerPairsWarning() const;
   /// A sentence that says so of the best evaluation; empty if it has all of them.
   std::string fewerPairsOfBest() const;
-  /// The initial run and the evaluations that have other pairs; empty as long as it is not known which is the initial
-  /// one.
+  /// The first successful run and the evaluations that have other pairs; empty as long as it is not known which is the
+  /// first successful one.
   std::set<int> numbersWithPairs() const;
-  /// How many evaluations have fewer pairs than the initial run.
-  std::size_t countOfFewerPairs() const;
 
   int evaluationCount() const { return evaluationCount_; }
   int failedCount() const { return failedCount_; }
@@ -83,6 +83,8 @@ class RunReporter final : public EvaluationObserver {
   void considerAsBest(int number, double aggregate, const std::vector<double>& parameterValues,
                       std::string_view foundAt);
   void requireLogWritten() const;
+  /// What is said of the pairs of this evaluation, of all measures with fewer; empty without any.
+  std::string fewerPairsText(int number) const;
 
   RunState& state_;
   ResultFile& results_;
@@ -98,8 +100,8 @@ class RunReporter final : public EvaluationObserver {
   int failedCount_ = 0;
   int replayedCount_ = 0;
   FailureSummary failures_;
-  int initialRun_ = 0;                                       ///< with whose pairs others are compared
-  std::map<std::pair<int, std::size_t>, FewerPairs> fewer_;  ///< by evaluation and measure
+  int firstSuccess_ = 0;                                     ///< with whose pairs others are compared
+  std::map<int, std::map<std::size_t, std::string>> fewer_;  ///< what is said of it, by evaluation and measure
   std::set<int> others_;  ///< evaluations with as many pairs or more, of other observations
 };
 

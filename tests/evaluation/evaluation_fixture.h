@@ -31,9 +31,9 @@ class RecordingObserver final : public EvaluationObserver {
     events.push_back(fmt::format("replay {} a={} {}", result.number, set[0], result.ok() ? "OK" : "FAILED"));
   }
   void pairsFound(const PairsFound& found) override {
-    if (found.initialNumber != 0) pairs.push_back(fmt::format("initial {}", found.initialNumber));
+    if (found.firstNumber != 0) pairs.push_back(fmt::format("first {}", found.firstNumber));
     for (const FewerPairs& fewer : found.fewer) {
-      pairs.push_back(fmt::format("{} has {} of {}", fewer.number, fewer.count, fewer.initialCount));
+      pairs.push_back(fmt::format("{} has {} of {}", fewer.number, fewer.count, fewer.firstCount));
     }
   }
   bool isCancelled() override { return cancelled; }
@@ -80,8 +80,9 @@ class EvaluationTest : public testing::Test {
     return text;
   }
 
-  /// Evaluations of an earlier run: the set's value by number, those with a negative one failed.
-  void takeUp(const std::map<int, double>& values) {
+  /// Evaluations of an earlier run: the set's value by number, those with a negative one failed. Early versions kept no
+  /// pairs.
+  void takeUp(const std::map<int, double>& values, bool keptPairs = true) {
     aggregator_ = std::make_unique<ObjectiveAggregator>(description_.objectives, method_);
     std::map<int, EarlierEvaluations::Record> records;
     for (const auto& [number, value] : values) {
@@ -89,7 +90,7 @@ class EvaluationTest : public testing::Test {
       const double measure = std::abs(value) - 1.0;
       record.parameterValues = {std::abs(value)};
       record.result = {.measureValues = {measure}, .objectiveValues = {std::abs(measure)}};
-      record.result.pairs = {{.count = 5}};
+      if (keptPairs) record.result.pairs = {{.count = 5}};
       if (value < 0) record.result.failure = EvaluationFailure{EvaluationFailure::Kind::signal, "in the past", {}};
     }
     earlier_ = std::make_unique<EarlierEvaluations>(parameters_->searchSpace(), *aggregator_, std::move(records));

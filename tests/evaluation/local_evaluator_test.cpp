@@ -105,15 +105,55 @@ TEST_F(LocalEvaluatorTest, TheFailureAfterTheLimitEndsTheRunOnceItIsOnRecord) {
   }
 }
 
+// The file in the base folder is filled, but with another year.
+TEST_F(LocalEvaluatorTest, ARunWithoutPairsIsAFailedOneAsSoonAsAnotherHasShownThatThereCanBeSome) {
+  const auto ofYear = [](std::string year) {
+    std::string text = series(3.0);
+    for (auto at = text.find("2001"); at != std::string::npos; at = text.find("2001", at + 4))
+      text.replace(at, 4, year);
+    return text;
+  };
+  folder_.write("base/simulated.csv", ofYear("1990"));
+  // evaluations of an earlier run; the years that the others write, the later ones sooner (empty: it fails); the failed
+  // ones (empty: the run ends)
+  const std::tuple<std::map<int, double>, std::vector<std::string>, std::vector<int>> cases[] = {
+      {{}, {"", "2001", "1990", "2001", "1990"}, {1, 3, 5}},
+      {{}, {"", "1990", "2001", "2001", "2001"}, {}},
+      {{{1, -2.0}}, {"1990", "2001", "2001", "2001"}, {}},
+      {{{1, 2.0}}, {"1990", "2001", "1990", "2001"}, {2, 4}},
+  };
+  for (const auto& [earlier, years, failing] : cases) {
+    for (const auto& [slots, keepsPairs] : {std::pair{1, true}, {3, true}, {3, false}}) {
+      takeUp(earlier, keepsPairs);
+      FakeLauncher launcher([&](int start, const std::string&) {
+        const std::string& year = years.at(static_cast<std::size_t>(start) - 1);
+        FakeLauncher::Batch batch = year.empty() ? fails(5.0) : computes(5.0 - start);
+        batch.write = [text = ofYear(year.empty() ? "2001" : year)](const std::string& folder) {
+          std::ofstream(folder + "/simulated.csv") << text;
+        };
+        return batch;
+      });
+      std::vector<int> failed;
+      const std::string refusal = refusalOf([&] {
+        for (const EvaluationResult& result : evaluate(makeEvaluator(launcher, slots, 100), std::vector(5, 2.0))) {
+          if (!result.ok()) failed.push_back(result.number);
+        }
+      });
+      EXPECT_EQ(failed, failing) << slots;
+      EXPECT_EQ(refusal.starts_with("Error: No simulated data found at observation times"), failing.empty()) << refusal;
+    }
+  }
+}
+
 TEST_F(LocalEvaluatorTest, RunsAreComparedWithTheFirstSuccessWhateverEndsFirst) {
   const std::vector<std::size_t> days{0, 4, 5, 2, 3};  // that each run writes; 0: it fails
   // coverage, evaluations of an earlier run, what fails, what is told of the pairs
   const std::tuple<double, std::map<int, double>, std::vector<int>, std::vector<std::string>> cases[] = {
-      {0.0, {}, {1}, {"initial 2", "4 has 2 of 4", "5 has 3 of 4"}},
-      {0.5, {}, {1}, {"initial 2", "4 has 2 of 4", "5 has 3 of 4"}},
-      {0.6, {}, {1, 4}, {"initial 2", "5 has 3 of 4"}},
-      {0.6, {{1, 2.0}}, {4}, {"initial 1", "2 has 4 of 5", "5 has 3 of 5"}},  // 3 of 5 are 0.6
-      {1.0, {{1, -2.0}, {2, 2.0}}, {1, 4, 5}, {"initial 2"}},
+      {0.0, {}, {1}, {"first 2", "4 has 2 of 4", "5 has 3 of 4"}},
+      {0.5, {}, {1}, {"first 2", "4 has 2 of 4", "5 has 3 of 4"}},
+      {0.6, {}, {1, 4}, {"first 2", "5 has 3 of 4"}},
+      {0.6, {{1, 2.0}}, {4}, {"first 1", "2 has 4 of 5", "5 has 3 of 5"}},  // 3 of 5 are 0.6
+      {1.0, {{1, -2.0}, {2, 2.0}}, {1, 4, 5}, {"first 2"}},
   };
   for (const auto& [coverage, earlier, failing, told] : cases) {
     description_.minimumCoverage = coverage;

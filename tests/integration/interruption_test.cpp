@@ -90,5 +90,48 @@ TEST_F(Interruption, ASecondRunOfTheSameFilesOrFoldersIsRefused) {
   EXPECT_FALSE(std::filesystem::exists(name + "_Process._lock_"));
 }
 
+// Its aggregate, by which it is the best, is known only when the initial sample gives the scale.
+TEST(EarlyEnd, NamesTheBestSetAsOneWithFewerPairsAfterItsMessageWithWhichTheLogEnds) {
+  for (const auto& [sixteenth, message] :
+       {std::pair{"exec sleep 3600", "Simulation cancelled"},
+        {"exit 7", "Error: Unable to continue. No of failed simulations too high."}}) {
+    const ModelFolder folder;
+    folder.write("model/run.sh",
+                 fmt::format("#!/bin/sh\necho run >>../runs\ntest $(wc -l <../runs) -lt 16 || {}\n{}\n"
+                             "grep -Eq '^a = *5 *$' parameters.txt || exit 0\n"
+                             "head -3 simulated.csv >cut && mv cut simulated.csv\n",
+                             sixteenth, MIREVO_TEST_MODEL),
+                 0755);
+    folder.write("sample.txt", "a b\n4 1\n5 2\n1 1\n2 3\n9 4\n8 2\n3 4\n7 1\n6 5\n2 2\n");
+    const std::string setup = folder.writeSetup({.algorithm = 0, .includesInitial = false, .aggregation = 1});
+    folder.editSetup("Initial_Sample_Generation = 0", "Initial_Sample_Generation = 4");
+    folder.editSetup("Initial_Sample_File_Name = ''", "Initial_Sample_File_Name = 'sample.txt'");
+    RunningProgram program({setup});
+    EXPECT_TRUE(folder.reaches("basin_Optimisation.dat", "\n15\tOK\t"));
+    if (!std::string_view(message).starts_with("Error")) folder.write("basin._kill_", "");
+    const std::string error = program.wait().error;
+    EXPECT_THAT(error, StartsWith(fmt::format("Mirevo: {}\n", message)));
+    EXPECT_EQ(occurrences(error, "\nMirevo: The best evaluation, No. 2, is judged by fewer observations"), 1);
+    EXPECT_EQ(occurrences(folder.read("basin.log"), "\nWarning: The best evaluation, No. 2, is judged by fewer"), 1);
+    EXPECT_THAT(folder.read("basin.log"), EndsWith(fmt::format("\n\n{}\n", message)));
+  }
+}
+
+TEST(EarlyEnd, TheReportOfARunThatASignalEndedNamesTheBestSetAsOneWithFewerPairs) {
+  const ModelFolder folder;
+  folder.write("model/run.sh",
+               fmt::format("#!/bin/sh\ngrep -Eq '^a = *6 *$' parameters.txt && exec sleep 3600\n{}\n"
+                           "grep -Eq '^a = *5 *$' parameters.txt || exit 0\n"
+                           "head -3 simulated.csv >cut && mv cut simulated.csv\n",
+                           MIREVO_TEST_MODEL),
+               0755);
+  RunningProgram program({folder.writeSetup({.option = 0, .scenarios = {"4, 1, 1", "5, 2, 1", "6, 1, 1"}})});
+  EXPECT_TRUE(folder.reaches("basin.dat", "\n2\tOK\t"));
+  program.send(SIGTERM);
+  program.wait();
+  EXPECT_EQ(RunningProgram({folder / "basin.kdx"}, {}, MIREVO_REPORT).wait().exitCode, 0);
+  EXPECT_EQ(occurrences(folder.read("basin_Report.html"), "The best evaluation, No. 2, is judged by fewer"), 1);
+}
+
 }  // namespace
 }  // namespace mirevo::testing

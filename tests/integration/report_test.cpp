@@ -100,6 +100,26 @@ TEST(Report, OfASensitivityAnalysisThatGoesOnSaysOfHowManyEvaluationsItsDerivati
               HasSubstr(R"("notes":["The statistics are those of an unfinished run: of 2 of 5 evaluations."])"));
 }
 
+TEST(Report, OfASensitivityAnalysisLeavesOutWhatIsOfOtherSetsThanThoseOfTheSetup) {
+  const ModelFolder folder;
+  folder.writeSetup({.option = 1});
+  ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0);
+  const char* const ofRun = R"("derivatives":[[-0.8166733,-0.8166733],[-0.4077077,-0.4077077]])";
+  EXPECT_THAT(reportData(folder), HasSubstr(ofRun));
+  // Now there is no step of a upwards, and the sets of b have other numbers.
+  folder.editSetup(
+      "TqSEKdxListItemCount = 0\n    [/INTERNAL_CONSTRAINTS]",
+      "TqSEKdxListItemCount = 1\n      [CONSTRAINT_1]\n        Left_Equation = 'a'\n        Right_Equation = '4.01'\n"
+      "        Logical_Operator = 1\n      [/CONSTRAINT_1]\n    [/INTERNAL_CONSTRAINTS]");
+  EXPECT_EQ(makeReport(folder).exitCode, 0);
+  EXPECT_THAT(reportData(folder), HasSubstr(ofRun));
+  std::filesystem::remove(folder / "basin_Sensitivities.dat");  // those of an unfinished run come from its rows
+  EXPECT_EQ(makeReport(folder).exitCode, 0);
+  EXPECT_THAT(reportData(folder), AllOf(HasSubstr(R"("derivatives":[[-0.8194029,-0.8194029],[null,null]])"),
+                                        HasSubstr(R"("notes":["Evaluations of other parameter sets than)"),
+                                        HasSubstr(R"(the derivatives that need them: No. 3, 4."])")));
+}
+
 // Results without the files that this version adds: the report has all that the others hold.
 TEST(Report, OfResultsOfAnEarlierVersion) {
   const ModelFolder folder;

@@ -139,7 +139,7 @@ TEST_F(Restart, GoesOnThoughAnotherTaskWasRunInBetween) {
   EXPECT_EQ(folder_.read("calSimErr.2.dat"), told);
 }
 
-TEST_F(Restart, RunsAreComparedWithTheInitialOneThatWasMadeBefore) {
+TEST_F(Restart, RunsAreComparedWithTheFirstSuccessfulOneThatWasMadeBefore) {
   folder_.write("model/run.sh",
                 fmt::format("#!/bin/sh\n{} \"$@\"\ngrep -Eq '^a = *5 *$' parameters.txt || exit 0\n"
                             "head -3 simulated.csv >cut && mv cut simulated.csv\n",
@@ -147,9 +147,9 @@ TEST_F(Restart, RunsAreComparedWithTheInitialOneThatWasMadeBefore) {
                 0755);
   std::vector<std::string> values = scenarios(12);
   values[5] = "5, 2, 1";  // which would be perfect if it did not end after two days
-  const std::string fewer = "output measure \"flow\" has 2 pairs, 365 in the initial run, No. 1";
+  const std::string fewer = "output measure \"flow\" has 2 pairs, 365 in the first successful run, No. 1";
   const std::string bestIsPoor =
-      "The best evaluation, No. 6, is judged by fewer observations than the initial run: " + fewer;
+      "The best evaluation, No. 6, is judged by fewer observations than the first successful run: " + fewer;
   for (const bool mayFail : {false, true}) {
     writeSetup({.option = 0, .scenarios = values, .slots = 3});
     if (mayFail) folder_.editSetup("    Aggregation_Method", "    Minimum_Coverage = 0.5\n    Aggregation_Method");

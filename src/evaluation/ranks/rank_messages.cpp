@@ -51,7 +51,9 @@ struct Layout<EvaluationResult> {
 };
 template <>
 struct Layout<RequiredPairs> {
-  static void of(auto& archive, auto& required) { archive(required.initialNumber, required.initialCounts); }
+  static void of(auto& archive, auto& required) {
+    archive(required.anyHasSucceeded, required.firstNumber, required.firstCounts);
+  }
 };
 template <>
 struct Layout<MeasurePairs> {

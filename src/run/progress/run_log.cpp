@@ -44,9 +44,8 @@ void RunLog::close() {
 }
 
 void RunLog::line(std::string_view text) {
-  std::string record(text);
-  record += '\n';
-  write(record);
+  lastRecord_ = text;
+  write(lastRecord_ + '\n');
 }
 
 void RunLog::reportLine(std::string_view text) {

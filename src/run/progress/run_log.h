@@ -43,6 +43,8 @@ class RunLog final {
   /// Whether the file is the log of a start that came to no model run; no, if it cannot be read.
   static bool isOfNoRun(const std::string& path);
 
+  /// What line() wrote last.
+  const std::string& lastRecord() const { return lastRecord_; }
   /// For signal handlers; -1 while no file is open.
   int descriptor() const { return descriptor_; }
   const std::string& path() const { return path_; }
@@ -64,6 +66,7 @@ class RunLog final {
   std::vector<std::string> warnings_;
   int warningCount_ = 0;
   std::string writeError_;
+  std::string lastRecord_;
 };
 
 }  // namespace mirevo

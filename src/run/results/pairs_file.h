@@ -15,8 +15,9 @@ namespace mirevo {
 /// Pairs by the number of their evaluation.
 using PairsByNumber = std::map<int, std::vector<MeasurePairs>>;
 
-/// The pairs of the initial run and of the runs that have fewer, `<setup>_Pairs.dat` and its like: for programs, and
-/// for a restart, which compares further runs with the initial one. The file appears with the first pairs.
+/// The pairs of the first successful run and of the runs that have fewer, `<setup>_Pairs.dat` and its like: for
+/// programs, and for a restart, which compares further runs with the first successful one. The file appears with the
+/// first pairs.
 class PairsFile final {
  public:
   /// `tableHead` is over the table, for people.

@@ -45,7 +45,7 @@ std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunCon
 
 /// The evaluations of an earlier run by number. `failures`: the reasons of the failed ones. `keptValues`: those of the
 /// others, if the task uses any; evaluations without them are left out, and therefore repeated. `pairs`: of the
-/// initial run and of runs that have fewer.
+/// first successful run and of runs that have others.
 std::map<int, EarlierEvaluations::Record> earlierRecords(EarlierRun& run,
                                                          const std::map<int, EvaluationFailure>& failures,
                                                          const PairsByNumber& pairs,

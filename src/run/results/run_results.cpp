@@ -156,7 +156,7 @@ void RunResults::writeTables(std::span<const DataTable> tables, RunLog& log) con
 }
 
 /// Those of every measure that earlier runs had.
-std::vector<std::string> RunResults::earlierBands() const {
+std::vector<std::string> RunResults::earlierBands(RunLog& log) const {
   const std::filesystem::path beginning(runFilePath(filePrefix_, run_files::kBand));
   const std::string stem = beginning.filename().string();
   std::vector<std::string> paths;
@@ -168,7 +168,11 @@ std::vector<std::string> RunResults::earlierBands() const {
     if (!takeText(number, stem) || !number.ends_with(run_files::kBand.extension)) continue;
     number.remove_suffix(run_files::kBand.extension.size());
     const std::string path = entry->path().string();
-    if (isDigits(number) && carriesMark(path, run_files::kBand)) paths.push_back(path);
+    if (!isDigits(number)) continue;
+    std::string reason;
+    const auto head = readFileHead(path, reason);
+    if (!head) log.warning(fmt::format("{}: {}. It may be a band of an earlier run, and is not kept", path, reason));
+    if (head && head->starts_with(run_files::kBand.mark)) paths.push_back(path);
   }
   std::sort(paths.begin(), paths.end());
   return paths;
@@ -180,7 +184,7 @@ void RunResults::keepEarlierFiles(const RunConfig& config, RunLog& log) const {
   for (std::string& path : pathsBesideResults()) paths.push_back(std::move(path));
   keepEarlierResults(paths, config.setupFile, log);
   if (names_.results == run_files::kPlain.results) {
-    for (const std::string& path : earlierBands()) keepEarlierFile(path, log);
+    for (const std::string& path : earlierBands(log)) keepEarlierFile(path, log);
   }
   keepEarlierFile(runFilePath(filePrefix_, run_files::kSavedFolder), log);
   const std::string failedFolders = runFilePath(processFolderPrefix(config), run_files::kFailedFolder);

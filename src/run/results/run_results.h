@@ -66,7 +66,7 @@ class RunResults final {
   /// Account, tables of failures and pairs, those of analyses.
   std::vector<std::string> pathsBesideResults() const;
   std::vector<std::string> bandPaths(const RunConfig& config) const;
-  std::vector<std::string> earlierBands() const;
+  std::vector<std::string> earlierBands(RunLog& log) const;
   /// Those of an unfinished run do not count any more when it goes on, and can be computed again.
   void removeStatistics(const RunConfig& config) const;
   void goOn(const RunConfig& config, const ObjectiveAggregator& aggregator, RunLog& log);

@@ -200,9 +200,10 @@ const SettingSection<RunConfig>& judgementSection() {
              .defaultValue = "0",
              .range = kFraction,
              .refusal = "Error: Minimum coverage invalid",
-             .meaning = "Least share, of the pairs of simulated and observed values that the initial run has of a "
-                        "measure, with which a model run counts; with a smaller share it is a failed run. 0: no run "
-                        "fails for lack of pairs, as long as it has any."})}}};
+             .meaning =
+                 "Least share, of the pairs of simulated and observed values that the first successful run has of a "
+                 "measure, with which a model run counts; with a smaller share it is a failed run. 0: no run "
+                 "fails for lack of pairs, as long as it has any."})}}};
   return section;
 }
 

@@ -42,7 +42,7 @@ struct RunConfig {
   std::vector<InternalConstraint> constraints;
   EvaluationPeriod period;
   AggregationMethod aggregationMethod = AggregationMethod::none;
-  double minimumCoverage = 0.0;  ///< share of the initial run's pairs below which a model run fails
+  double minimumCoverage = 0.0;  ///< share of the first successful run's pairs below which a model run fails
   std::vector<OutputMeasure> measures;
   std::string measureFile;
   std::vector<ObjectiveFunction> objectives;

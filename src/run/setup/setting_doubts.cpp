@@ -150,6 +150,14 @@ void warnOfObjectives(const RunConfig& config, const SectionsRead& sections) {
   sections.objectives.front().warn("Weight", "the weights of all objective functions are 0, and so is every aggregate");
 }
 
+void warnOfCoverage(const RunConfig& config, const SectionsRead& sections) {
+  const bool comparesSeries =
+      std::any_of(config.measures.begin(), config.measures.end(),
+                  [](const OutputMeasure& measure) { return measure.interfaceType == InterfaceType::timeSeries; });
+  if (!(config.minimumCoverage > 0.0) || comparesSeries) return;
+  sections.judgement->warn("Minimum_Coverage", "has no effect, as no output measure compares series");
+}
+
 void warnOfProcessFolder(const RunConfig& config, const SectionsRead& sections) {
   if (config.processFolder.empty()) return;
   constexpr std::string_view kKeyword = "ProcessFolder";
@@ -172,6 +180,7 @@ void warnOfDoubtfulSettings(const RunConfig& config, const SectionsRead& section
   warnOfParameters(config, sections);
   warnOfMeasures(config, sections);
   warnOfObjectives(config, sections);
+  warnOfCoverage(config, sections);
   if (config.task && config.task->hasFinalRun()) warnOfSearch(config, sections);
   warnOfProcessFolder(config, sections);
 }

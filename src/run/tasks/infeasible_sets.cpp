@@ -33,9 +33,8 @@ void warnOfInfeasibleSets(const TaskContext& context, std::span<const ParameterS
   if (endsRun) {
     text += fmt::format("\n   The run will end before it is complete: at most {} may fail, a tenth of the {} planned",
                         limit, planned);
-    if (!remedy.empty() && count == sets.size()) {
-      text +=
-          fmt::format("\n   None of the {} satisfies the constraints: are they meant, and the settings right?", what);
+    if (count == sets.size()) {
+      text += fmt::format("\n   None of the {} satisfies the constraints: check the constraints and the values", what);
     } else if (!remedy.empty()) {
       text.append("\n   ").append(remedy);
     }

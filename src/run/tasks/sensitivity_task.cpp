@@ -13,6 +13,7 @@
 #include "evaluation/stored_results.h"
 #include "measures/period_series.h"
 #include "run/tasks/analysis_names.h"
+#include "run/tasks/infeasible_sets.h"
 
 namespace mirevo {
 namespace {
@@ -203,6 +204,9 @@ TaskOutcome SensitivityTask::outcomeOf(const TaskContext& context, Evaluator& ev
 }
 
 TaskOutcome SensitivityTask::run(const TaskContext& context) {
+  const PerturbationPlan plan =
+      planPerturbations(settings, context.space, context.space.initial, {}, context.feasibility);
+  warnOfInfeasibleSets(context, plan.sets, "sets of the analysis", plannedEvaluations(context.space.size()));
   TaskOutcome outcome = outcomeOf(context, context.evaluator);
   logReport(context, outcome.report);
   return outcome;
@@ -210,17 +214,21 @@ TaskOutcome SensitivityTask::run(const TaskContext& context) {
 
 std::optional<TaskOutcome> SensitivityTask::unfinishedOutcome(const TaskContext& context,
                                                               const UnfinishedBatch& made) const {
-  std::map<int, EvaluationResult> results;
-  for (const EvaluationResult& result : made.results) {
-    if (result.ok()) results[result.number] = result;
+  std::map<int, StoredResults::Record> records;
+  int succeeded = 0;
+  for (std::size_t i = 0; i < made.results.size(); ++i) {
+    const EvaluationResult& result = made.results[i];
+    records[result.number] = {ToModelScale(context.space, made.sets[i]), result};
+    if (result.ok()) ++succeeded;
   }
-  if (!results.contains(1) || results.size() < 2) return std::nullopt;  // a derivative needs the base set and another
-  for (const EvaluationResult& result : made.results) results.try_emplace(result.number, result);
+  const auto base = records.find(1);
+  const bool hasBase = base != records.end() && base->second.result.ok();
+  if (!hasBase || succeeded < 2) return std::nullopt;  // a derivative needs the base set and another
   EvaluationResult missing;
   missing.measureValues.assign(context.measures.size(), kFailedRunValue);
   missing.objectiveValues.assign(context.objectives.size(), kFailedRunValue);
   missing.failure = {EvaluationFailure::Kind::notKnown, "the run ended before it was made", {}};
-  StoredResults evaluator(std::move(results), std::move(missing));
+  StoredResults evaluator(context.space, std::move(records), std::move(missing));
   return outcomeOf(context, evaluator);
 }
 

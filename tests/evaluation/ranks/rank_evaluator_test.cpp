@@ -82,7 +82,7 @@ TEST_F(RankEvaluatorTest, WhoeverIsFreeGetsTheNextSetAndResultsStandInTheOrderOf
   EXPECT_EQ(launcher_.starts, 0);
 }
 
-TEST_F(RankEvaluatorTest, WorkersWaitForTheInitialRunWhosePairsTheirsNeed) {
+TEST_F(RankEvaluatorTest, WorkersWaitForTheFirstSuccessfulRunWhosePairsTheirsNeed) {
   description_.minimumCoverage = 0.5;
   pairs_ = {{.count = 5}};
   RankEvaluator& master = makeMaster();
@@ -92,7 +92,7 @@ TEST_F(RankEvaluatorTest, WorkersWaitForTheInitialRunWhosePairsTheirsNeed) {
   evaluate(master, {2.0, 4.0, 6.0});
   std::vector<std::pair<int, std::vector<std::size_t>>> required;
   for (const Message& message : job_.sent) {
-    required.emplace_back(message.rank, decodeSet(message.content).requiredPairs.initialCounts);
+    required.emplace_back(message.rank, decodeSet(message.content).requiredPairs.firstCounts);
   }
   EXPECT_THAT(required, ElementsAre(testing::Pair(1, IsEmpty()), testing::Pair(1, ElementsAre(5)),
                                     testing::Pair(2, ElementsAre(5))));

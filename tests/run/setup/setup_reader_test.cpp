@@ -219,6 +219,9 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatAreSeldomMeant)
        "setup.kdx:64:16: Name: the observed series is in the file of the simulated one, which the model writes"},
       {"Aggregation_Method = 0 => 3",
        "setup.kdx:60:26: Aggregation_Method: makes every aggregate 0: the search cannot tell one set from another"},
+      {"Interface_Type = 0 => 1 & Aggregation_Method = 0 => Aggregation_Method = 0\nMinimum_Coverage = 0.5",
+       "setup.kdx:61:20: Minimum_Coverage: has no effect, as no output measure compares series"},
+      {"Aggregation_Method = 0 => Aggregation_Method = 0\nMinimum_Coverage = 0.5", ""},
       {"Aggregation_Method = 0 => 3 & Option = 2 => 0 & NoSimultaneousSim = 4 => 1", ""},
       {"Statistic_Type = 1 => 0 & Function_Type = 2 => 0",
        "setup.kdx:92:25: Function_Type: a sum with a difference that may be negative (\"Flow error\") is the smaller "
