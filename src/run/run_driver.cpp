@@ -279,7 +279,7 @@ void RunDriver::openSeries() {
       state_.log.warning(fmt::format("The series of the earlier run are not taken up: {}: {}", path, reason));
     }
     const SeriesTable table = readSeriesTable(earlier.value_or(std::string{}));
-    if (table.isOf(task)) {
+    if (table.isOf(task) && !table.isCutOff()) {
       series_->resume(table);
     } else {
       keepEarlierFile(path);  // of a run of another task in between
@@ -414,7 +414,7 @@ std::optional<RunDriver::Unwritten> RunDriver::closeResults(const Ending& ending
 }
 
 void RunDriver::reportRun() {
-  if (!config_.writesReport || !results_ || results_->table().path().empty()) return;
+  if (!config_.writesReport || !reporter_ || reporter_->evaluationCount() == 0) return;
   std::string reason;
   if (!writeReport(config_, filePrefix_, reason)) {
     state_.log.warning("The report cannot be written: " + reason);
