@@ -320,4 +320,10 @@ bool writeReport(const RunConfig& config, const std::string& filePrefix, std::st
   return false;
 }
 
+bool isReportOf(const std::string& path, std::string_view task) {
+  std::string reason;
+  const auto text = readTextFile(path, reason);
+  return text && text->find(fmt::format(R"("task":"{}","taskName":)", task)) != std::string::npos;
+}
+
 }  // namespace mirevo

@@ -242,14 +242,15 @@ void RunDriver::openResults() {
   }
 }
 
-/// If the run were killed, an earlier report would be taken for its own. A report of a continued run is removed, as it
-/// can be made again at any time.
+/// If the run were killed, an earlier report would be taken for its own. That of a run that goes on is removed, as it
+/// can be made again at any time; one of another task is kept.
 void RunDriver::putEarlierReportAside() {
-  if (results_->earlierEvaluations() != nullptr) {
+  const std::string path = runFilePath(filePrefix_, run_files::kReport);
+  if (results_->earlierEvaluations() != nullptr && isReportOf(path, config_.task->facts().name.name)) {
     std::error_code ignored;
-    std::filesystem::remove(runFilePath(filePrefix_, run_files::kReport), ignored);
-  } else if (const std::string kept = keepEarlierFile(runFilePath(filePrefix_, run_files::kReport)); !kept.empty()) {
-    state_.log.line("The report of the earlier run was kept as " + kept);
+    std::filesystem::remove(path, ignored);
+  } else {
+    keepEarlierFile(path, state_.log);
   }
 }
 
@@ -282,7 +283,7 @@ void RunDriver::openSeries() {
     if (table.isOf(task) && !table.isCutOff()) {
       series_->resume(table);
     } else {
-      keepEarlierFile(path);  // of a run of another task in between
+      keepEarlierFile(path, state_.log);  // damaged, or of a run of another task in between
     }
   }
   reporter_->recordSeries(*series_);
@@ -306,7 +307,7 @@ TaskContext RunDriver::taskContext() {
 TaskOutcome RunDriver::runTask() {
   if (!config_.task) return {std::string(kEndOfTask)};
   outcome_ = config_.task->run(taskContext());
-  for (const TaskFile& file : outcome_->files) writeBesideResults(file.path, file.content);
+  for (const TaskFile& file : outcome_->files) writeBesideResults(file.path, file.content, state_.log);
   return *outcome_;
 }
 
@@ -336,9 +337,9 @@ std::vector<std::string> RunDriver::keepStatistics() {
     if (!outcome || outcome->report.empty()) return {};
     report = outcome->report;
     if (!outcome_) {
-      for (const TaskFile& file : outcome->files) writeBesideResults(file.path, file.content);
+      for (const TaskFile& file : outcome->files) writeBesideResults(file.path, file.content, state_.log);
     }
-    results_->writeTables(outcome->tables);
+    results_->writeTables(outcome->tables, state_.log);
     if (!outcome_) results_->record().record().analysed = reporter_->evaluationCount() - reporter_->failedCount();
   } catch (const FatalError& error) {
     state_.log.warning(fmt::format("The statistics lack a part: {}\n{}", error.message(), error.detail()));
@@ -425,7 +426,7 @@ void RunDriver::finish(const TaskOutcome& outcome) {
   results_->close();
   reporter_->settle(*aggregator_);
   warnOfFewerPairs();
-  results_->writeTables(outcome.tables);
+  results_->writeTables(outcome.tables, state_.log);
   const Ending ending{RunStage::finished, outcome.terminationMessage, outcome.terminationMessage};
   if (const auto unwritten = closeResults(ending, outcome.report)) {
     fatalError("Error: Unable to write to " + unwritten->path, unwritten->reason);

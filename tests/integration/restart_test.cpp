@@ -93,9 +93,16 @@ TEST_F(Restart, AFinishedRunIsWalkedThroughAndEndsWithTheSameFile) {
   EXPECT_FALSE(folder_.exists("basin.1.dat"));
   EXPECT_FALSE(folder_.exists("basin_Band_1.1.csv"));
   folder_.editSetup("Restart = 1", "Restart = 0");
+  folder_.write("basin_Band_2.csv", "# Band of a measure that the setup had\n");
+  folder_.write("basin_Band_3.csv", "of the model\n");
   run();
-  EXPECT_TRUE(folder_.exists("basin.1.dat"));
   EXPECT_EQ(results(), expected);
+  EXPECT_FALSE(folder_.exists("basin_Band_2.csv"));
+  EXPECT_TRUE(folder_.exists("basin_Band_3.csv"));
+  for (const char* name : {"basin.", "basin_Run.", "basin_Restart.", "basin_Simulated.", "basin_Quantiles.",
+                           "basin_Band_1.", "basin_Band_2.", "basin_Series."}) {
+    EXPECT_THAT(log(), HasSubstr(" of an earlier run was kept as " + (folder_ / name) + "1.")) << name;
+  }
 }
 
 TEST_F(Restart, ARaisedBudgetTakesAFinishedSearchFurther) {

@@ -82,8 +82,18 @@ std::string runningPrefixThatShares(const std::string& prefix) {
   return {};
 }
 
-std::string keepEarlierResults(const std::string& path, const std::string& setupFile, RunLog& log) {
+void logKept(const std::string& path, const std::string& kept, RunLog& log) {
+  if (!kept.empty()) log.line(fmt::format("{} of an earlier run was kept as {}", fileNameOf(path), kept));
+}
+
+std::string keepEarlierFile(const std::string& path, RunLog& log) {
   std::string kept = keepEarlierFile(path);
+  logKept(path, kept, log);
+  return kept;
+}
+
+std::string keepEarlierResults(const std::string& path, const std::string& setupFile, RunLog& log) {
+  std::string kept = keepEarlierFile(path, log);
   if (kept.empty()) return kept;
   std::string reason;
   const auto head = readFileHead(kept, reason);
@@ -98,6 +108,16 @@ std::string keepEarlierResults(const std::string& path, const std::string& setup
         path, earlier, setupFile, kept));
   }
   return kept;
+}
+
+void writeBesideResults(const std::string& path, const std::string& text, RunLog& log) {
+  std::string reason;
+  if (readTextFile(path, reason) == text) return;
+  keepEarlierFile(path, log);
+  RecordFile file;
+  file.open(path);
+  file.append(text);
+  file.close();
 }
 
 }  // namespace mirevo
