@@ -89,7 +89,7 @@ std::string dataTableRow(const std::vector<DataTable::Cell>& cells) {
 
 std::string dataTableHead(const DataTable& table) {
   std::string text;
-  for (const std::string& line : table.headLines) text += "# " + onOneLine(line) + '\n';
+  for (const std::string& line : table.headLines) text += "# " + withValidUtf8(onOneLine(line)) + '\n';
   return text + dataTableRow({table.columns.begin(), table.columns.end()});
 }
 

@@ -1,7 +1,10 @@
 #include "common/encoding.h"
 
+#include <algorithm>
 #include <array>
 #include <cstdint>
+
+#include <fmt/format.h>
 
 #include "common/utf8.h"
 
@@ -56,6 +59,18 @@ std::string fromUtf16(std::string_view text) {
 bool isUtf16(std::string_view text) {
   if (text.starts_with("\xFF\xFE") || text.starts_with("\xFE\xFF")) return true;
   return text.size() >= 2 && (text[0] == '\0') != (text[1] == '\0');
+}
+
+std::string faultOfEncoding(std::string_view content) {
+  if (isUtf16(content)) return "the file is UTF-16 text; save it as UTF-8, for example with iconv -f UTF-16 -t UTF-8";
+  const std::size_t at = content.find('\0');
+  if (at == std::string_view::npos) return {};
+  const auto line = std::count(content.begin(), content.begin() + static_cast<std::ptrdiff_t>(at), '\n') + 1;
+  return fmt::format(
+      "line {} holds a zero byte (NUL), which no text has: save the file as UTF-8 text, for example with tr -d "
+      "'\\000', "
+      "if nothing else is wrong with it",
+      line);
 }
 
 DecodedText decodeText(std::string_view text) {

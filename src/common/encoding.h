@@ -5,11 +5,12 @@
 
 namespace mirevo {
 
-/// What a refusal of UTF-16 text says.
-inline constexpr std::string_view kUtf16Refusal = "the file is UTF-16 text; save it as UTF-8";
-
 /// Whether text begins as UTF-16 does: with its byte order mark, or with a zero byte among its first two.
 bool isUtf16(std::string_view text);
+
+/// What a refusal says of the content of a file that is UTF-16 or holds a zero byte, and how to convert it; empty for
+/// any other.
+std::string faultOfEncoding(std::string_view content);
 
 /// Text in UTF-8, and what it was read as: "UTF-8", "UTF-16" or "Latin-1".
 struct DecodedText {

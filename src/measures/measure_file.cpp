@@ -4,6 +4,7 @@
 
 #include <fmt/core.h>
 
+#include "common/encoding.h"
 #include "common/files.h"
 #include "common/text.h"
 
@@ -24,8 +25,9 @@ std::optional<std::vector<double>> parseMeasureFile(const std::string& sourceNam
       const std::optional<double> number = parseReal(word);
       if (!number) {
         constexpr std::size_t kLongest = 60;
-        reason = fmt::format("{}:{}:{}: expected a number, found \"{}\"", sourceName, lineNumber, begin + 1,
-                             word.substr(0, kLongest));
+        const std::string fault = faultOfEncoding(content);
+        reason = fmt::format("{}:{}:{}: expected a number, found {}{}{}", sourceName, lineNumber, begin + 1,
+                             quotedForMessage(word.substr(0, kLongest)), fault.empty() ? "" : "; ", fault);
         return std::nullopt;
       }
       numbers.push_back(*number);

@@ -21,7 +21,9 @@ void failLongLine(std::string_view templateName, std::size_t lineNumber, std::si
 }
 
 std::vector<std::string_view> templateLines(std::string_view templateName, std::string_view text) {
-  if (isUtf16(text)) fatalError(fmt::format("Error: Unable to open template file {}", templateName), kUtf16Refusal);
+  if (const std::string fault = faultOfEncoding(text); !fault.empty()) {
+    fatalError(fmt::format("Error: Unable to open template file {}", templateName), fault);
+  }
   std::vector<std::string_view> lines = splitLines(text);
   for (std::size_t i = 0; i < lines.size(); ++i) {
     lines[i] = trimBlanks(lines[i]);

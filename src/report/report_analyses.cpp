@@ -10,11 +10,13 @@
 #include <fmt/core.h>
 
 #include "algorithms/analyses/local_sensitivity.h"
+#include "algorithms/analyses/series_band.h"
 #include "common/calendar.h"
 #include "common/data_table.h"
 #include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/run_files.h"
+#include "common/take_text.h"
 #include "common/text.h"
 #include "evaluation/stored_results.h"
 #include "measures/period_series.h"
@@ -61,13 +63,32 @@ void appendColumns(std::vector<std::vector<double>>& rows, const std::vector<std
   for (std::size_t i = 0; i < more.size(); ++i) rows[i].insert(rows[i].end(), more[i].begin(), more[i].end());
 }
 
-std::optional<ReportedBand> readBand(const std::string& path) {
+/// How many rows the head of a band says that it has; nothing in those of earlier versions.
+std::optional<std::int32_t> rowsOfBand(std::string_view text) {
+  for (std::string_view line : splitLines(text.substr(0, text.find("\ntime")))) {
+    if (takeText(line, "# ") && takeText(line, kBandRows)) return parseInteger(trimTrailing(line));
+  }
+  return std::nullopt;
+}
+
+/// Empty where there is none; `fault` tells of a file that is damaged.
+std::optional<ReportedBand> readBand(const std::string& path, std::string& fault) {
   constexpr int kItems = 4;
   std::string reason;
   const auto file = createTimeSeriesObject(path, reason);
-  if (!file || !file->open(path) || file->itemCount() != kItems || !file->startTime()) return std::nullopt;
-  for (int item = 1; item <= kItems; ++item) {
-    if (!file->getData(item)) return std::nullopt;
+  std::error_code ignored;
+  if (!std::filesystem::exists(path, ignored)) return std::nullopt;
+  const std::string text = readTextFile(path, reason).value_or(std::string());
+  bool isRead = file && file->open(path) && file->itemCount() == kItems && file->startTime();
+  for (int item = 1; isRead && item <= kItems; ++item) isRead = file->getData(item);
+  const auto rows = rowsOfBand(text);
+  if (!isRead) {
+    if (rows != 0) fault = fileNameOf(path) + " is damaged and left out";
+    return std::nullopt;
+  }
+  const std::int64_t wholeRows = std::ssize(file->times()) - (text.ends_with('\n') ? 0 : 1);
+  if (rows && wholeRows != *rows) {
+    fault = fmt::format("{} is cut off or damaged: {} of its {} rows are whole", fileNameOf(path), wholeRows, *rows);
   }
   ReportedBand band;
   const std::int64_t origin = secondNumber(*file->startTime());
@@ -117,10 +138,13 @@ std::string pairName(std::span<const OutputMeasure> measures, std::size_t measur
   return name;
 }
 
-std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::string& filePrefix) {
+std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::string& filePrefix,
+                                        std::vector<std::string>& faults) {
   std::vector<ReportedBand> bands;
   for (const std::size_t i : measuresOfDistinctPairs(config.measures)) {
-    auto band = readBand(runFilePath(filePrefix, run_files::kBand, static_cast<int>(i) + 1));
+    std::string fault;
+    auto band = readBand(runFilePath(filePrefix, run_files::kBand, static_cast<int>(i) + 1), fault);
+    if (!fault.empty()) faults.push_back(fault);
     if (!band) continue;
     band->measure = pairName(config.measures, i);
     bands.push_back(std::move(*band));

@@ -18,9 +18,10 @@ namespace mirevo {
 /// commas.
 std::string pairName(std::span<const OutputMeasure> measures, std::size_t measure);
 
-/// The bands that a finished uncertainty analysis has written beside its results, one per pair of series; those that
-/// cannot be read are left out.
-std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::string& filePrefix);
+/// The bands that an uncertainty analysis has written beside its results, one per pair of series; those that cannot be
+/// read are left out. `faults` gets a text on each that is damaged.
+std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::string& filePrefix,
+                                        std::vector<std::string>& faults);
 
 /// The results of a local sensitivity analysis, computed from its rows; empty without a row for the initial values.
 std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, const SensitivitySettings& settings,

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 
+#include "common/utf8.h"
 #include "report/report_json.h"
 
 namespace mirevo {
@@ -33,7 +34,7 @@ std::string escapeHtml(std::string_view text) {
 }  // namespace
 
 std::string reportPage(std::string_view page, const ReportData& data) {
-  const std::string title = escapeHtml(data.run.title.empty() ? data.run.setupName : data.run.title);
+  const std::string title = escapeHtml(withValidUtf8(data.run.title.empty() ? data.run.setupName : data.run.title));
   const std::string json = reportJson(data);
   std::string text;
   text.reserve(page.size() + title.size() + json.size());

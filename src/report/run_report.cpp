@@ -235,6 +235,10 @@ void ReportBuilder::addSeries() {
     return;
   }
   data_.series = *std::move(source.content);
+  if (data_.series.isCutOff()) {
+    note(fmt::format("{} is cut off or damaged: {} of its {} rows can be read.", source.file, data_.series.rowCount(),
+                     *data_.series.rowsWritten));
+  }
   if (!data_.series.isOf(data_.run.task)) {
     note(
         fmt::format("Hydrographs are not shown: {} is of a run of another task ({}).", source.file, data_.series.task));
@@ -269,7 +273,11 @@ void ReportBuilder::addAnalyses() {
   const auto& analysed = sources_.record.analysed;
   const bool hasAnalysis = isFinished || analysed;
   const TaskReport task = config_.task->report();
-  if (task.hasBands && hasAnalysis) data_.bands = reportedBands(config_, filePrefix_);
+  if (task.hasBands && hasAnalysis) {
+    std::vector<std::string> faults;
+    data_.bands = reportedBands(config_, filePrefix_, faults);
+    for (const std::string& fault : faults) note(fault + ".");
+  }
   if (task.sensitivity != nullptr) {
     data_.sensitivity = reportedSensitivity(config_, *task.sensitivity, space(), sources_.results.rows);
   }
@@ -312,6 +320,12 @@ bool writeReport(const RunConfig& config, const std::string& filePrefix, std::st
     reason = error.what();
   }
   return false;
+}
+
+bool isReportOf(const std::string& path, std::string_view task) {
+  std::string reason;
+  const auto text = readTextFile(path, reason);
+  return text && text->find(fmt::format(R"("task":"{}","taskName":)", task)) != std::string::npos;
 }
 
 }  // namespace mirevo

@@ -2,6 +2,7 @@
 
 #include <optional>
 #include <string>
+#include <string_view>
 
 #include "report/report_data.h"
 #include "run/setup/run_config.h"
@@ -14,5 +15,8 @@ std::optional<ReportData> buildReport(const RunConfig& config, const std::string
 
 /// Builds the report and writes it to its path. False, with the reason, when that fails; never throws.
 bool writeReport(const RunConfig& config, const std::string& filePrefix, std::string& reason) noexcept;
+
+/// Whether the file is a report on a run of that task.
+bool isReportOf(const std::string& path, std::string_view task);
 
 }  // namespace mirevo

@@ -1,5 +1,6 @@
 #include "report/run_sources.h"
 
+#include <algorithm>
 #include <array>
 #include <ctime>
 #include <filesystem>
@@ -12,6 +13,7 @@
 #include "common/file_lock.h"
 #include "common/files.h"
 #include "common/run_files.h"
+#include "run/tasks/tasks.h"
 
 namespace mirevo {
 namespace {
@@ -46,6 +48,20 @@ std::optional<RunRecord> readRecord(const std::string& path, std::string& fault)
   return record;
 }
 
+/// Why results are not those of the task: the other one writes files of the same names.
+std::string ofAnotherTask(const std::string& path, const std::string& key, const Task& wanted) {
+  const auto all = tasks().all();
+  const auto other =
+      std::find_if(all.begin(), all.end(), [&key](const auto& task) { return task->facts().name.name == key; });
+  const std::string setting = other == all.end() || !(*other)->facts().name.code
+                                  ? fmt::format("Option = '{}'", key)
+                                  : fmt::format("Option = {}", *(*other)->facts().name.code);
+  return fmt::format(
+      "{}: these are results of another task ({}), and the setup now selects {}. For their report, set {} "
+      "again",
+      path, other == all.end() ? std::string_view(key) : (*other)->facts().longName, wanted.facts().longName, setting);
+}
+
 }  // namespace
 
 std::optional<RunSources> readRunSources(const RunConfig& config, const SearchSpace& space,
@@ -63,8 +79,16 @@ std::optional<RunSources> readRunSources(const RunConfig& config, const SearchSp
   }
   RunSources sources;
   sources.results = readResultTable(*text, resultColumns(config, space));
+  if (sources.results.rows.empty() && sources.results.rowsOfOtherColumns == 0) {
+    reason = path + ": it holds no evaluation, so there is nothing to report";
+    return std::nullopt;
+  }
   putInOrder(sources.results.rows);
   auto record = readRecord(runFilePath(filePrefix, names->record), sources.recordFault);
+  if (record && !record->task.empty() && record->task != config.task->facts().name.name) {
+    reason = ofAnotherTask(path, record->task, *config.task);
+    return std::nullopt;
+  }
   const bool isGoingOn = FileLock::isHeld(runFilePath(filePrefix, run_files::kRunLock));
   if (record && !record->stage && !isGoingOn && !sources.results.closingLines.empty()) {
     sources.recordFault = fileNameOf(runFilePath(filePrefix, names->record)) + ": it lacks its end";

@@ -71,6 +71,7 @@ int RunDriver::run(const std::string& setupFileName) {
     openRun(setupFileName);
     const std::string setupText = readSetupText(setupFileName);
     config_ = readSetup(setupFileName, setupText, state_.log, state_.job->hasWorkers());
+    isSetupRead_ = true;
     buildModel();
     logSetup();
     openResults();
@@ -121,7 +122,7 @@ void RunDriver::openRun(const std::string& setupFileName) {
   }
   const std::string logFile = runFilePath(filePrefix_, run_files::kLog);
   requireReplaceable(logFile, run_files::kLog);
-  const std::string keptLog = RunLog::isOfRefusedSetup(logFile) ? std::string() : keepEarlierFile(logFile);
+  const std::string keptLog = RunLog::isOfNoRun(logFile) ? std::string() : keepEarlierFile(logFile);
   std::string reason;
   if (!state_.log.open(logFile, reason)) fatalError("Error: Unable to open " + logFile, reason);
   signalState.runLogDescriptor = state_.log.descriptor();
@@ -222,7 +223,7 @@ void RunDriver::logSetup() {
 }
 
 void RunDriver::openResults() {
-  isAccepted_ = true;
+  hasBegun_ = true;
   state_.objectiveValues.resize(config_.objectives.size());
   results_->open(config_, runner_->observedSeries(), *aggregator_, state_.log);
   putEarlierReportAside();
@@ -241,14 +242,15 @@ void RunDriver::openResults() {
   }
 }
 
-/// If the run were killed, an earlier report would be taken for its own. A report of a continued run is removed, as it
-/// can be made again at any time.
+/// If the run were killed, an earlier report would be taken for its own. That of a run that goes on is removed, as it
+/// can be made again at any time; one of another task is kept.
 void RunDriver::putEarlierReportAside() {
-  if (results_->earlierEvaluations() != nullptr) {
+  const std::string path = runFilePath(filePrefix_, run_files::kReport);
+  if (results_->earlierEvaluations() != nullptr && isReportOf(path, config_.task->facts().name.name)) {
     std::error_code ignored;
-    std::filesystem::remove(runFilePath(filePrefix_, run_files::kReport), ignored);
-  } else if (const std::string kept = keepEarlierFile(runFilePath(filePrefix_, run_files::kReport)); !kept.empty()) {
-    state_.log.line("The report of the earlier run was kept as " + kept);
+    std::filesystem::remove(path, ignored);
+  } else {
+    keepEarlierFile(path, state_.log);
   }
 }
 
@@ -278,10 +280,10 @@ void RunDriver::openSeries() {
       state_.log.warning(fmt::format("The series of the earlier run are not taken up: {}: {}", path, reason));
     }
     const SeriesTable table = readSeriesTable(earlier.value_or(std::string{}));
-    if (table.isOf(task)) {
+    if (table.isOf(task) && !table.isCutOff()) {
       series_->resume(table);
     } else {
-      keepEarlierFile(path);  // of a run of another task in between
+      keepEarlierFile(path, state_.log);  // damaged, or of a run of another task in between
     }
   }
   reporter_->recordSeries(*series_);
@@ -305,7 +307,7 @@ TaskContext RunDriver::taskContext() {
 TaskOutcome RunDriver::runTask() {
   if (!config_.task) return {std::string(kEndOfTask)};
   outcome_ = config_.task->run(taskContext());
-  for (const TaskFile& file : outcome_->files) writeBesideResults(file.path, file.content);
+  for (const TaskFile& file : outcome_->files) writeBesideResults(file.path, file.content, state_.log);
   return *outcome_;
 }
 
@@ -335,9 +337,9 @@ std::vector<std::string> RunDriver::keepStatistics() {
     if (!outcome || outcome->report.empty()) return {};
     report = outcome->report;
     if (!outcome_) {
-      for (const TaskFile& file : outcome->files) writeBesideResults(file.path, file.content);
+      for (const TaskFile& file : outcome->files) writeBesideResults(file.path, file.content, state_.log);
     }
-    results_->writeTables(outcome->tables);
+    results_->writeTables(outcome->tables, state_.log);
     if (!outcome_) results_->record().record().analysed = reporter_->evaluationCount() - reporter_->failedCount();
   } catch (const FatalError& error) {
     state_.log.warning(fmt::format("The statistics lack a part: {}\n{}", error.message(), error.detail()));
@@ -413,7 +415,7 @@ std::optional<RunDriver::Unwritten> RunDriver::closeResults(const Ending& ending
 }
 
 void RunDriver::reportRun() {
-  if (!config_.writesReport || !results_ || results_->table().path().empty()) return;
+  if (!config_.writesReport || !reporter_ || reporter_->evaluationCount() == 0) return;
   std::string reason;
   if (!writeReport(config_, filePrefix_, reason)) {
     state_.log.warning("The report cannot be written: " + reason);
@@ -424,7 +426,7 @@ void RunDriver::finish(const TaskOutcome& outcome) {
   results_->close();
   reporter_->settle(*aggregator_);
   warnOfFewerPairs();
-  results_->writeTables(outcome.tables);
+  results_->writeTables(outcome.tables, state_.log);
   const Ending ending{RunStage::finished, outcome.terminationMessage, outcome.terminationMessage};
   if (const auto unwritten = closeResults(ending, outcome.report)) {
     fatalError("Error: Unable to write to " + unwritten->path, unwritten->reason);
@@ -531,7 +533,7 @@ void RunDriver::endLogInError(std::string_view message, std::string_view details
   const EndingSignalsHeld held;  // or a signal's message could come below
   if (reporter_) logFailures();
   if (!details.empty()) state_.log.line(fmt::format("\n{}", details));
-  if (!isAccepted_) state_.log.markRefused();
+  if (!hasBegun_) state_.log.markAsOfNoRun(isSetupRead_ ? "The run did not begin" : "The setup is refused");
   state_.log.line(fmt::format("\n{}", message));
   signalState.runLogDescriptor = -1;
   state_.log.close();

@@ -91,7 +91,8 @@ class RunDriver final {
   FileLock runLock_;                 ///< on the files with the setup's name
   std::list<FileLock> sharedLocks_;  ///< those of other setups whose runs may write files of this run
   FileLock processLock_;             ///< the master's, on the process folders of the job
-  bool isAccepted_ = false;          ///< the setup: from now on files of earlier runs are touched
+  bool isSetupRead_ = false;
+  bool hasBegun_ = false;   ///< from now on files of earlier runs are touched
   std::string filePrefix_;  ///< folder and name of the setup, without ".kdx": the beginning of the paths of the run's
                             ///< files
   RunConfig config_;

@@ -141,6 +141,40 @@ TEST(Report, OfATaskThatWasNotTheLastOneOfItsSetup) {
     const auto member = [name](const std::string& text) { return text.substr(text.find(name), 60); };
     EXPECT_EQ(member(again), member(data));
   }
+  for (const int option : {1, 2, 2}) {  // each goes on: only the report of its own task may go
+    folder.writeSetup({.option = option, .maxEvaluations = 30, .restart = 1});
+    ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0);
+  }
+  EXPECT_THAT(reportData(folder), HasSubstr(R"("task":"optimisation")"));
+  EXPECT_THAT(folder.read("basin_Report.1.html"), HasSubstr(R"("task":"optimisation")"));
+  EXPECT_THAT(folder.read("basin_Report.2.html"), HasSubstr(R"("task":"optimisation")"));
+  EXPECT_THAT(folder.read("basin_Report.3.html"), HasSubstr(R"("task":"sensitivity")"));
+  EXPECT_FALSE(folder.exists("basin_Report.4.html"));
+}
+
+TEST(Report, SaysWhatIsMissingInItsFilesAndIsNotMadeOfWhatIsNotThere) {
+  const ModelFolder folder;
+  folder.writeSetup({.option = 3, .maxEvaluations = 5});
+  ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0);
+  const auto cutTo = [&folder](const char* file, std::size_t length) {
+    folder.write(file, folder.read(file).substr(0, length));
+  };
+  cutTo("basin_Series.dat", folder.read("basin_Series.dat").find("2001-02-01"));
+  cutTo("basin_Band_1.csv", folder.read("basin_Band_1.csv").size() - 1);
+  EXPECT_EQ(makeReport(folder).exitCode, 0);
+  EXPECT_THAT(reportData(folder),
+              HasSubstr(R"("notes":["basin_Series.dat is cut off or damaged: 31 of its 365 rows can be read.",)"
+                        R"("basin_Band_1.csv is cut off or damaged: 364 of its 365 rows are whole."])"));
+  folder.editSetup("Option = 3", "Option = 0");
+  EXPECT_THAT(
+      makeReport(folder).error,
+      HasSubstr("basin.dat: these are results of another task (uncertainty analysis), and the setup now selects "
+                "scenario runs. For their report, set Option = 3 again"));
+  folder.editSetup("Option = 0", "Option = 3");
+  cutTo("basin.dat", folder.read("basin.dat").find("\n1\tOK") + 1);
+  const ProgramResult ofNone = makeReport(folder);
+  EXPECT_EQ(ofNone.exitCode, 1);
+  EXPECT_THAT(ofNone.error, HasSubstr("basin.dat: it holds no evaluation"));
 }
 
 TEST(Report, IsLeftOutWhereTheSetupSaysSoAndNeverFailsTheRun) {

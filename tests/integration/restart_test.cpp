@@ -79,8 +79,10 @@ TEST_F(Restart, AFinishedRunIsWalkedThroughAndEndsWithTheSameFile) {
   const std::string expected = results();
   folder_.write("model/run.sh", folder_.read("model/run.sh") + "\n");  // the same model, but not the same text
   run(1);
-  EXPECT_THAT(log(), AllOf(HasSubstr("the content of model/run.sh has changed"),
-                           EndsWith("\n\nError: Unable to continue the earlier run\n")));
+  EXPECT_THAT(log(),
+              AllOf(HasSubstr("the content of model/run.sh has changed"),
+                    HasSubstr("\nThe run did not begin: no model was run, and the next start replaces this log\n"),
+                    EndsWith("\n\nError: Unable to continue the earlier run\n")));
   EXPECT_EQ(results(), expected) << "refused without a change";
   folder_.useScript("");
   run();
@@ -91,9 +93,16 @@ TEST_F(Restart, AFinishedRunIsWalkedThroughAndEndsWithTheSameFile) {
   EXPECT_FALSE(folder_.exists("basin.1.dat"));
   EXPECT_FALSE(folder_.exists("basin_Band_1.1.csv"));
   folder_.editSetup("Restart = 1", "Restart = 0");
+  folder_.write("basin_Band_2.csv", "# Band of a measure that the setup had\n");
+  folder_.write("basin_Band_3.csv", "of the model\n");
   run();
-  EXPECT_TRUE(folder_.exists("basin.1.dat"));
   EXPECT_EQ(results(), expected);
+  EXPECT_FALSE(folder_.exists("basin_Band_2.csv"));
+  EXPECT_TRUE(folder_.exists("basin_Band_3.csv"));
+  for (const char* name : {"basin.", "basin_Run.", "basin_Restart.", "basin_Simulated.", "basin_Quantiles.",
+                           "basin_Band_1.", "basin_Band_2.", "basin_Series."}) {
+    EXPECT_THAT(log(), HasSubstr(" of an earlier run was kept as " + (folder_ / name) + "1.")) << name;
+  }
 }
 
 TEST_F(Restart, ARaisedBudgetTakesAFinishedSearchFurther) {

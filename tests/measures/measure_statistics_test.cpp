@@ -180,6 +180,8 @@ TEST(MeasureFile, FreeFormat) {
   EXPECT_THAT(parseMeasureFile("m.txt", "", reason).value(), IsEmpty());
   EXPECT_FALSE(parseMeasureFile("m.txt", "1 2\n3, NaN\n", reason).has_value());
   EXPECT_EQ(reason, "m.txt:2:4: expected a number, found \"NaN\"");
+  EXPECT_FALSE(parseMeasureFile("m.txt", "\xFF\xFE", reason).has_value());
+  EXPECT_THAT(reason, HasSubstr("; the file is UTF-16 text; save it as UTF-8"));
   EXPECT_FALSE(readMeasureFile("no_such_folder/m.txt", reason).has_value());
   EXPECT_EQ(reason, "no_such_folder/m.txt: No such file or directory");
 }

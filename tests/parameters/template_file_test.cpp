@@ -112,13 +112,14 @@ TEST(ParameterTemplate, FillsPlaceholders) {
 }
 
 TEST(ParameterTemplate, RefusesWhatItCannotFill) {
-  const std::tuple<const char*, const char*, const char*> cases[] = {
+  const std::tuple<std::string, const char*, const char*> cases[] = {
       {"", "Error: Delimiter not defined in template file t", "first line"},
       {"   \n!K!", "Error: Delimiter not defined in template file t", "first line"},
       {"1\n1K1", "Error: Delimiter not defined in template file t", "\"1\" is a character of numbers"},
       {"§\n§K§", "Error: Delimiter not defined in template file t", "single-byte"},
       {"!\n\nab !K", "Error: Parameter name  in template file  invalid", "t:3:4: the delimiter ! has no partner"},
       {"\xFF\xFE!", "Error: Unable to open template file t", "the file is UTF-16 text; save it as UTF-8"},
+      {std::string("!\n!K!\0", 6), "Error: Unable to open template file t", "line 2 holds a zero byte (NUL)"},
       {"!\n!!", "Error: Parameter name  in template file  invalid", "t:2:1: no parameter"},
       {"!\n!   !", "Error: Parameter name  in template file  invalid", "t:2:1: no parameter"},
       {"!\n!K! !Maning channel !", "Error: Parameter name Maning channel in template file Maning channel invalid",

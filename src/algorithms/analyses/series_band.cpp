@@ -47,7 +47,8 @@ SeriesBand seriesBand(std::span<const double> observed, std::span<const Evaluati
 
 std::string seriesBandText(std::string_view title, const ObservedSeries& observed, const SeriesBand& band) {
   constexpr double kSecondsPerDay = 86400.0;
-  std::string text = fmt::format("# Band of {}\ntime,observed,5 %,50 %,95 %\n", columnName(title));
+  std::string text = fmt::format("# Band of {}\n# {}{}\ntime,observed,5 %,50 %,95 %\n", columnName(title), kBandRows,
+                                 observed.days.size());
   const std::int64_t origin = secondNumber(observed.start);
   for (std::size_t t = 0; t < observed.days.size(); ++t) {
     const DateRecord time = dateOfSecond(origin + std::llround(observed.days[t] * kSecondsPerDay));

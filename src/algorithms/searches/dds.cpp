@@ -202,13 +202,17 @@ std::string_view DdsMethod::budgetRefusal() const {
   return "Error: Maximum No. of model evaluations in DDS algorithm invalid";
 }
 
+std::int64_t DdsMethod::sampleSize(const InitialSampleSettings& sample, int budget) const {
+  return evaluatesSample(sample) ? ddsStartPointCount(budget) : 1;
+}
+
 RaisedBudget DdsMethod::raiseBudget(const SearchHistory& history, const StoppingCriteria& stopping,
                                     const InitialSampleSettings& sample) const {
   RaisedBudget raised;
   const bool isFirst = history.searches.empty();
   const int before = isFirst ? 0 : history.searches.back().lastEvaluation;
   if (history.evaluations <= before) return raised;  // the latest search had not begun
-  const int startPoints = isFirst && evaluatesSample(sample) ? ddsStartPointCount(history.budget) : 1;
+  const int startPoints = isFirst ? static_cast<int>(sampleSize(sample, history.budget)) : 1;
   const int last = std::min(history.budget, std::max(history.evaluations, before + startPoints));
   raised.earlier = EarlierSearch{history.budget, last};
   raised.note = fmt::format(

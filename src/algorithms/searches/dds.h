@@ -86,6 +86,7 @@ class DdsMethod final : public SearchMethod {
   std::string_view budgetRefusal() const override;
   /// Random start points, unless it starts from the initial set.
   bool evaluatesSample(const InitialSampleSettings& sample) const override { return !sample.includeInitialParameters; }
+  std::int64_t sampleSize(const InitialSampleSettings& sample, int budget) const override;
   /// DDS perturbs ever fewer parameters as its budget is used up, so that another budget means another search. It
   /// starts from the best parameter set of the earlier one, whose evaluations are kept.
   RaisedBudget raiseBudget(const SearchHistory& history, const StoppingCriteria& stopping,

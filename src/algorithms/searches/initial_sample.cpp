@@ -8,6 +8,7 @@
 
 #include "algorithms/numbers/latin_hypercube.h"
 #include "algorithms/numbers/sobol.h"
+#include "common/encoding.h"
 #include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/text.h"
@@ -229,6 +230,9 @@ std::size_t givenSetCount(const InitialSampleSettings& settings, std::size_t cou
 
 std::vector<ParameterSet> readInitialSample(std::string_view fileName, std::string_view text,
                                             const SearchSpace& space) {
+  if (const std::string fault = faultOfEncoding(text); !fault.empty()) {
+    fatalError(kInvalidFile, fmt::format("{}: {}", fileName, fault));
+  }
   std::vector<ParameterSet> sets;
   std::optional<RowSplitter> splitter;
   std::vector<std::size_t> parameters;

@@ -82,6 +82,10 @@ class SearchMethod {
 
   /// Number of points of its population; 0 if it has none.
   virtual std::int64_t populationSize() const { return 0; }
+  /// Number of sets that it evaluates before it proposes any, unless the budget is smaller.
+  virtual std::int64_t sampleSize(const InitialSampleSettings& /*sample*/, int /*budget*/) const {
+    return populationSize();
+  }
   /// Least number of evaluations in a loop.
   virtual double evaluationsPerLoop() const { return 1.0; }
   /// Number of loops after the initial sample until `sets` parameter sets are evaluated, before a surrogate model is

@@ -61,7 +61,7 @@ bool CsvTimeSeries::parse(std::string sourceName, std::string content) {
   sourceName_ = std::move(sourceName);
   content_ = std::move(content);
   if (isUtf16(content_)) {
-    lastError_ = sourceName_ + ": " + std::string(kUtf16Refusal);
+    lastError_ = sourceName_ + ": " + faultOfEncoding(content_);
     return false;
   }
   std::size_t position = content_.starts_with(kByteOrderMark) ? kByteOrderMark.size() : 0;
@@ -244,6 +244,7 @@ bool CsvTimeSeries::fail(const char* at, std::string_view expected, std::string_
   lastError_ += expected;
   lastError_ += ", found ";
   lastError_ += found;
+  if (const std::string fault = faultOfEncoding(content_); !fault.empty()) lastError_ += "; " + fault;
   return false;
 }
 

@@ -7,6 +7,7 @@
 
 #include <fmt/core.h>
 
+#include "common/encoding.h"
 #include "common/fatal_error.h"
 #include "common/text.h"
 #include "run/access/setup_value.h"
@@ -32,12 +33,13 @@ std::string patternOf(std::string_view path) {
   return pattern;
 }
 
-bool isThere(const KdxSection& target, std::string_view path) {
+/// The section with this path; nullptr if it is not there.
+const KdxSection* sectionAt(const KdxSection& target, std::string_view path) {
   const KdxSection* node = &target;
   for (const std::string_view name : splitAt(path, '/')) {
-    if (node = node->section(name); node == nullptr) return false;
+    if (node = node->section(name); node == nullptr) break;
   }
-  return true;
+  return node;
 }
 
 /// A section as it is to be added, with the keywords that have no default.
@@ -86,9 +88,11 @@ std::string wantedInstead(const KdxUnquotedText& found, const SetupSchema& schem
 KdxDocument parsed(const std::string& fileName, std::string_view text, const SetupSchema& schema) {
   auto result = parseKdx(fileName, text);
   if (const auto* error = std::get_if<KdxSyntaxError>(&result)) {
-    fatalError("Error: Unable to open " + fileName,
-               fmt::format("{}:{}:{}: {}{}", fileName, error->position.line, error->position.column, error->message,
-                           error->unquoted ? wantedInstead(*error->unquoted, schema) : ""));
+    const std::string fault = faultOfEncoding(text);
+    fatalError(
+        "Error: Unable to open " + fileName,
+        fmt::format("{}:{}:{}: {}{}{}{}", fileName, error->position.line, error->position.column, error->message,
+                    error->unquoted ? wantedInstead(*error->unquoted, schema) : "", fault.empty() ? "" : "; ", fault));
   }
   return std::get<KdxDocument>(std::move(result));
 }
@@ -99,7 +103,7 @@ SetupFile::SetupFile(const std::string& fileName, std::string folder, std::strin
                      RunLog& log)
     : document_(parsed(fileName, text, schema)), folder_(std::move(folder)), schema_(schema), log_(log) {
   for (const SectionRow* row : schema_.sections()) {
-    if (row->readWhen == "always") needed_.push_back(row);
+    if (row->readWhen == "always") needed_.emplace_back(row->path);
   }
 }
 
@@ -109,25 +113,29 @@ SetupSection SetupFile::target() {
   return {*this, *document_.root.section(kSetupTarget), "", ""};
 }
 
-void SetupFile::need(const std::vector<const SectionRow*>& sections) {
-  needed_.insert(needed_.end(), sections.begin(), sections.end());
+void SetupFile::need(const std::vector<std::string>& paths) {
+  needed_.insert(needed_.end(), paths.begin(), paths.end());
 }
 
 std::string SetupFile::linesToAdd(std::string_view parent, std::string_view opened, bool isOpenedListed) const {
+  constexpr int kMostSections = 20;
   const KdxSection* target = document_.root.section(kSetupTarget);
   if (target == nullptr) return {};
-  const std::string missing = inside(parent, opened);
   std::string lines;
-  if (const SectionRow* row = schema_.findSection(patternOf(missing)); row != nullptr && isOpenedListed) {
-    lines += linesOfSection(parent, opened, *row);
-  }
-  for (const SectionRow* row : needed_) {
-    if (row->path == missing || isThere(*target, row->path)) continue;
-    const std::size_t slash = row->path.rfind('/');
+  int count = 0;
+  const auto add = [&](std::string_view inWhich, std::string_view name) {
+    const SectionRow* row = schema_.findSection(patternOf(inside(inWhich, name)));
+    if (row != nullptr && ++count <= kMostSections) lines += linesOfSection(inWhich, name, *row);
+  };
+  if (isOpenedListed) add(parent, opened);
+  const std::string missing = inside(parent, opened);
+  for (const std::string_view path : needed_) {
+    if (path == missing || sectionAt(*target, path) != nullptr) continue;
+    const std::size_t slash = path.rfind('/');
     const bool isTop = slash == std::string_view::npos;
-    lines += linesOfSection(isTop ? std::string_view{} : row->path.substr(0, slash),
-                            isTop ? row->path : row->path.substr(slash + 1), *row);
+    add(isTop ? std::string_view{} : path.substr(0, slash), isTop ? path : path.substr(slash + 1));
   }
+  if (count > kMostSections) lines += fmt::format("\n   and {} more", count - kMostSections);
   return lines.empty() ? lines : "\nsections to add:" + lines;
 }
 
@@ -153,7 +161,20 @@ SetupSection::SetupSection(SetupFile& file, const KdxSection& node, std::string 
     : file_(&file), node_(&node), path_(std::move(path)), pattern_(std::move(pattern)) {}
 
 bool SetupSection::holds(std::string_view path) const {
-  return isThere(*node_, path);
+  return sectionAt(*node_, path) != nullptr;
+}
+
+std::optional<SetupValue> SetupSection::peek(std::string_view path, std::string_view keyword) const {
+  const KdxSection* node = sectionAt(*node_, path);
+  const KeywordRow* row = file_->schema().findKeyword(patternOf(inside(path_, path)), keyword);
+  if (node == nullptr || row == nullptr) return std::nullopt;
+  const KdxKeyword* found = node->keyword(keyword);
+  if (found == nullptr) {
+    return row->isRequired() || row->isLeftOutByDefault() ? std::nullopt : std::optional(defaultSetupValue(*row));
+  }
+  auto converted = convertSetupValue(*row, *found);
+  auto* value = std::get_if<SetupValue>(&converted);
+  return value == nullptr ? std::nullopt : std::optional(std::move(*value));
 }
 
 std::optional<SetupSection> SetupSection::openIfPresent(std::string_view name) const {

@@ -46,10 +46,10 @@ class SetupFile final {
   /// are unchanged.
   std::string relative(const std::string& path) const;
 
-  /// The run needs these sections, too, and not only those that are always read.
-  void need(const std::vector<const SectionRow*>& sections);
-  /// The needed sections that the setup lacks, as lines to add to it: those of `opened`, a section that is missing in
-  /// `parent`, come first. `isOpenedListed`: false if it is there under another name.
+  /// The run needs the sections with these paths, too, and not only those that are always read.
+  void need(const std::vector<std::string>& paths);
+  /// The needed sections that the setup lacks, the first of them, as lines to add to it: those of `opened`, a section
+  /// that is missing in `parent`, come first. `isOpenedListed`: false if it is there under another name.
   std::string linesToAdd(std::string_view parent, std::string_view opened, bool isOpenedListed) const;
 
   /// Every setting that affects the results, in reading order.
@@ -60,7 +60,7 @@ class SetupFile final {
   std::string folder_;
   const SetupSchema& schema_;
   RunLog& log_;
-  std::vector<const SectionRow*> needed_;
+  std::vector<std::string> needed_;  ///< paths
   std::vector<ResultSetting> resultSettings_;
 };
 
@@ -75,6 +75,9 @@ class SetupSection final {
   std::optional<SetupSection> openIfPresent(std::string_view name) const;
   /// Whether there is a section with this path, names with `/` between them, in this one; echoes nothing.
   bool holds(std::string_view path) const;
+  /// The value, or default, of a keyword in the section with this path, before it is read: it is neither echoed nor
+  /// refused. Empty if the section or a valid value is not there.
+  std::optional<SetupValue> peek(std::string_view path, std::string_view keyword) const;
   /// `PARAMETER_12` for the prefix `PARAMETER_`.
   SetupSection openItem(std::string_view prefix, std::size_t number) const;
 

@@ -15,6 +15,7 @@
 #include "common/progress_messages.h"
 #include "common/run_files.h"
 #include "common/text.h"
+#include "common/utf8.h"
 #include "platform/signals/signal_state.h"
 
 namespace mirevo {
@@ -87,7 +88,7 @@ void ProgressReporter::writeRecord(std::string_view kind, std::string_view text)
   } else {
     record = kind;
   }
-  record += text;
+  record += withValidUtf8(text);
   std::replace_if(
       record.begin(), record.end(), [](char c) { return c == '\n' || c == '\r'; }, ' ');
   record += '\n';

@@ -12,6 +12,7 @@
 #include "common/descriptor.h"
 #include "common/descriptor_output.h"
 #include "common/file_copy.h"
+#include "common/utf8.h"
 
 namespace mirevo {
 
@@ -65,7 +66,7 @@ void RunLog::warning(std::string_view text) {
   if (listener_) listener_(record);
 }
 
-bool RunLog::isOfRefusedSetup(const std::string& path) {
+bool RunLog::isOfNoRun(const std::string& path) {
   constexpr off_t kMostRead = 65536;  // the mark is a few lines from the end
   const Descriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
   const off_t size = file.get() < 0 ? 0 : ::lseek(file.get(), 0, SEEK_END);
@@ -74,7 +75,7 @@ bool RunLog::isOfRefusedSetup(const std::string& path) {
   const ssize_t length = ::pread(file.get(), end.data(), end.size(), size - static_cast<off_t>(end.size()));
   if (length <= 0) return false;
   end.resize(static_cast<std::size_t>(length));
-  return end.find(fmt::format("\n{}\n\n", kRefused)) != std::string::npos;
+  return end.find(fmt::format("{}\n\n", kOfNoRun)) != std::string::npos;
 }
 
 /// One write(2) per record, so that a signal handler never writes into the middle of one, and without buffering, so
@@ -85,7 +86,8 @@ void RunLog::write(std::string_view record) {
     return;
   }
   putBackIfRemoved(descriptor_, path_);  // if that fails, the log and the run go on all the same
-  const int error = writeWhole(descriptor_, record).error;
+  // What a model prints and what files are called may be in any encoding.
+  const int error = writeWhole(descriptor_, withValidUtf8(record)).error;
   if (error != 0 && writeError_.empty()) writeError_ = std::strerror(error);
 }
 

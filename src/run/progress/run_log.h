@@ -38,10 +38,10 @@ class RunLog final {
   const std::vector<std::string>& warnings() const { return warnings_; }
   int warningCount() const { return warningCount_; }
 
-  /// Writes that no model was run, for isOfRefusedSetup().
-  void markRefused() { line(kRefused); }
-  /// Whether the file is the log of a run whose setup was refused; no, if it cannot be read.
-  static bool isOfRefusedSetup(const std::string& path);
+  /// Writes that no model was run, and why ("The setup is refused"), for isOfNoRun().
+  void markAsOfNoRun(std::string_view why) { line(std::string(why).append(kOfNoRun)); }
+  /// Whether the file is the log of a start that came to no model run; no, if it cannot be read.
+  static bool isOfNoRun(const std::string& path);
 
   /// For signal handlers; -1 while no file is open.
   int descriptor() const { return descriptor_; }
@@ -52,8 +52,7 @@ class RunLog final {
 
  private:
   static constexpr std::string_view kWarning = "Warning: ";
-  static constexpr std::string_view kRefused =
-      "The setup is refused: no model was run, and the next start replaces this log";
+  static constexpr std::string_view kOfNoRun = ": no model was run, and the next start replaces this log";
 
   void write(std::string_view record);
 

@@ -38,7 +38,7 @@ FailedRunFile::FailedRunFile(FailedRunPaths paths, std::string setupName, std::v
       tableHead_(std::move(tableHead)) {}
 
 std::string FailedRunFile::headLine() const {
-  return fmt::format("# Failed evaluations of {}\n", setupName_);
+  return fmt::format("# Failed evaluations of {}\n", withValidUtf8(setupName_));
 }
 
 FailedRunFile::Earlier FailedRunFile::readEarlier(const std::set<int>& numbers) const {
@@ -55,18 +55,20 @@ FailedRunFile::Earlier FailedRunFile::readEarlier(const std::set<int>& numbers) 
   return earlier;
 }
 
-void FailedRunFile::continueBehind(std::span<const FailureRow> rows,
-                                   const std::map<int, std::vector<double>>& parameterValues) {
+std::string FailedRunFile::continueBehind(std::span<const FailureRow> rows,
+                                          const std::map<int, std::vector<double>>& parameterValues) {
   std::string table = failureTableHead(tableHead_);
   std::string records = headLine();
   for (const FailureRow& row : rows) {
     table += failureRowText(row);
     records += record(parameterValues.at(row.number), row);
   }
-  if (readFileIfThere(paths_.forPeople) != records) keepEarlierFile(paths_.forPeople);
-  if (rows.empty() && !readFileIfThere(paths_.table)) return;  // they appear with the first failure
+  std::string kept;
+  if (readFileIfThere(paths_.forPeople) != records) kept = keepEarlierFile(paths_.forPeople);
+  if (rows.empty() && !readFileIfThere(paths_.table)) return kept;  // they appear with the first failure
   continueWith(table_, paths_.table, table);
   continueWith(forPeople_, paths_.forPeople, records);
+  return kept;
 }
 
 void FailedRunFile::add(std::span<const double> parameterValues, const EvaluationResult& result) {

@@ -42,9 +42,10 @@ class FailedRunFile final {
   Earlier readEarlier(const std::set<int>& numbers) const;
 
   /// Continues both files behind those failures. `parameterValues`: of each, by number, model scale. A file for people
-  /// that holds anything else is kept under a numbered name: it may be of another task, or of another setup in this
-  /// folder. Throws FatalError.
-  void continueBehind(std::span<const FailureRow> rows, const std::map<int, std::vector<double>>& parameterValues);
+  /// that holds anything else is kept under a numbered name, which is returned: it may be of another task, or of
+  /// another setup in this folder. Throws FatalError.
+  std::string continueBehind(std::span<const FailureRow> rows,
+                             const std::map<int, std::vector<double>>& parameterValues);
 
   /// One failed evaluation; `parameterValues` on the model scale, one a name. Throws FatalError when it cannot be
   /// written.

@@ -119,14 +119,4 @@ std::string keepEarlierFile(const std::string& path) {
   return kept;
 }
 
-void writeBesideResults(const std::string& path, const std::string& text) {
-  std::string reason;
-  if (readTextFile(path, reason) == text) return;
-  keepEarlierFile(path);
-  RecordFile file;
-  file.open(path);
-  file.append(text);
-  file.close();
-}
-
 }  // namespace mirevo

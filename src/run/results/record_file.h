@@ -55,8 +55,4 @@ class RecordFile final {
 /// renamed.
 std::string keepEarlierFile(const std::string& path);
 
-/// Writes a text to a file beside the results, as a whole. An existing file with the same content is left as it is; one
-/// with other content is kept under a numbered name. Throws FatalError.
-void writeBesideResults(const std::string& path, const std::string& text);
-
 }  // namespace mirevo

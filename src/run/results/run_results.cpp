@@ -1,5 +1,6 @@
 #include "run/results/run_results.h"
 
+#include <algorithm>
 #include <filesystem>
 #include <set>
 #include <system_error>
@@ -12,6 +13,7 @@
 #include "common/files.h"
 #include "common/replaceable_files.h"
 #include "common/run_files.h"
+#include "common/take_text.h"
 #include "common/text.h"
 #include "common/version.h"
 #include "run/results/record_file.h"
@@ -126,7 +128,7 @@ void RunResults::lockFailedRuns(RunLog& log) {
   const std::string own = runFilePath(filePrefix_, run_files::kOwnFailedRuns);
   if (failedRunsLock_.take(pathBeside(filePrefix_, run_files::kFailedRunsLock), {}, 0.0)) {
     if (!failedRunsLock_.warning().empty()) log.warning(failedRunsLock_.warning());
-    keepEarlierFile(own);  // it would be taken for this run's
+    keepEarlierFile(own, log);  // it would be taken for this run's
     return;
   }
   log.line(fmt::format("{} is that of another run{} in this folder: failed evaluations of this one are described in {}",
@@ -139,7 +141,7 @@ void RunResults::close() {
   if (simulatedValues_) simulatedValues_->close();
 }
 
-void RunResults::writeTables(std::span<const DataTable> tables) const {
+void RunResults::writeTables(std::span<const DataTable> tables, RunLog& log) const {
   for (const DataTable& found : tables) {
     DataTable table = found;
     table.headLines.insert(table.headLines.begin(), tableHead_.begin(), tableHead_.end());
@@ -147,26 +149,40 @@ void RunResults::writeTables(std::span<const DataTable> tables) const {
     const std::string text = dataTableText(table);
     std::string reason;
     if (readTextFile(path, reason) == text) continue;  // of a run that is walked through again
-    keepEarlierFile(path);
+    keepEarlierFile(path, log);
     if (!replaceFile(path, text, reason)) fatalError("Error: Unable to write to " + path, reason);
   }
 }
 
+/// Those of every measure that earlier runs had.
+std::vector<std::string> RunResults::earlierBands() const {
+  const std::filesystem::path beginning(runFilePath(filePrefix_, run_files::kBand));
+  const std::string stem = beginning.filename().string();
+  std::vector<std::string> paths;
+  std::error_code failed;
+  std::filesystem::directory_iterator entry(beginning.parent_path(), failed);
+  for (; !failed && entry != std::filesystem::directory_iterator(); entry.increment(failed)) {
+    const std::string name = entry->path().filename().string();
+    std::string_view number = name;
+    if (!takeText(number, stem) || !number.ends_with(run_files::kBand.extension)) continue;
+    number.remove_suffix(run_files::kBand.extension.size());
+    const std::string path = entry->path().string();
+    if (isDigits(number) && carriesMark(path, run_files::kBand)) paths.push_back(path);
+  }
+  std::sort(paths.begin(), paths.end());
+  return paths;
+}
+
 void RunResults::keepEarlierFiles(const RunConfig& config, RunLog& log) const {
-  keepEarlierFile(failedRuns_.paths().forPeople);
-  if (const std::string kept = keepEarlierResults(files_.results, config.setupFile, log); !kept.empty()) {
-    log.line("The results of the earlier run were kept as " + kept);
+  keepEarlierFile(failedRuns_.paths().forPeople, log);
+  std::vector<std::string> paths{files_.results, files_.settings, files_.simulatedValues,
+                                 files_.record,  files_.failures, files_.pairs};
+  for (const RunFile& table : names_.tables) paths.push_back(runFilePath(filePrefix_, table));
+  for (const std::string& path : paths) keepEarlierResults(path, config.setupFile, log);
+  if (names_.results == run_files::kPlain.results) {
+    for (const std::string& path : earlierBands()) keepEarlierFile(path, log);
   }
-  for (const std::string& path :
-       {files_.settings, files_.simulatedValues, files_.record, files_.failures, files_.pairs}) {
-    keepEarlierResults(path, config.setupFile, log);
-  }
-  for (const RunFile& table : names_.tables) {
-    keepEarlierResults(runFilePath(filePrefix_, table), config.setupFile, log);
-  }
-  if (const std::string kept = keepEarlierFile(runFilePath(filePrefix_, run_files::kSavedFolder)); !kept.empty()) {
-    log.line("The saved output files of the earlier run were kept as " + kept);
-  }
+  keepEarlierFile(runFilePath(filePrefix_, run_files::kSavedFolder), log);
   const std::string failedFolders = runFilePath(processFolderPrefix(config), run_files::kFailedFolder);
   for (const std::string& problem : removeFailedRunFolders(failedFolders, {})) log.warning(problem);
 }
@@ -214,7 +230,7 @@ void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggreg
   record_.begin(record);
   table_.open(files_.results, headLines(config, record), columns_, run.rows);
   // Only now: were the run killed before, rows that are gone from the table would still be in it.
-  failedRuns_.continueBehind(earlier.rows, failedSets);
+  logKept(failedRuns_.paths().forPeople, failedRuns_.continueBehind(earlier.rows, failedSets), log);
   pairs_.continueBehind(std::move(pairs));
   const std::string failedFolders = runFilePath(processFolderPrefix(config), run_files::kFailedFolder);
   for (const std::string& problem : removeFailedRunFolders(failedFolders, failed)) log.warning(problem);

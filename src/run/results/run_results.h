@@ -51,7 +51,7 @@ class RunResults final {
 
   /// Writes what the task found, each table to its own file; an earlier one with other content is kept under a numbered
   /// name. Throws FatalError.
-  void writeTables(std::span<const DataTable> tables) const;
+  void writeTables(std::span<const DataTable> tables, RunLog& log) const;
 
   ResultFile& table() { return table_; }
   FailedRunFile& failedRuns() { return failedRuns_; }
@@ -67,6 +67,7 @@ class RunResults final {
   void startAfresh(const RunConfig& config, RunLog& log);
   void keepEarlierFiles(const RunConfig& config, RunLog& log) const;
   std::vector<std::string> bandPaths(const RunConfig& config) const;
+  std::vector<std::string> earlierBands() const;
   /// Those of an unfinished run do not count any more when it goes on, and can be computed again.
   void removeStatistics(const RunConfig& config) const;
   void goOn(const RunConfig& config, const ObjectiveAggregator& aggregator, RunLog& log);

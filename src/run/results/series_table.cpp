@@ -11,6 +11,7 @@
 #include "common/calendar.h"
 #include "common/data_table.h"
 #include "common/text.h"
+#include "common/utf8.h"
 #include "run/results/result_row.h"
 
 namespace mirevo {
@@ -26,6 +27,7 @@ constexpr std::string_view kInitialAggregate = "initialAggregate";
 constexpr std::string_view kHasInitialParameters = "hasInitialParameters";
 constexpr std::string_view kBest = "bestEvaluation";
 constexpr std::string_view kBestAggregate = "bestAggregate";
+constexpr std::string_view kRows = "rows";  ///< how many there are below the header
 }  // namespace key
 
 /// The same for people: "Initial: evaluation 2, the first that succeeded, aggregate 0.1". Files of earlier versions of
@@ -92,6 +94,8 @@ bool readKey(std::string_view line, SeriesTable& table) {
     shown(table.best).number = *number;
   } else if (name == key::kBestAggregate && real) {
     shown(table.best).aggregate = *real;
+  } else if (name == key::kRows && number) {
+    table.rowsWritten = static_cast<std::size_t>(*number);
   } else {
     return false;
   }
@@ -131,6 +135,12 @@ void readRow(std::string_view line, SeriesTable& table) {
 
 }  // namespace
 
+std::size_t SeriesTable::rowCount() const {
+  std::size_t count = 0;
+  for (const ShownSeries& one : series) count += one.seconds.size();
+  return count;
+}
+
 std::optional<std::int64_t> readIsoTime(std::string_view text) {
   constexpr std::string_view kPattern = "0000-00-00T00:00:00";
   if (text.size() != kPattern.size()) return std::nullopt;
@@ -160,7 +170,7 @@ std::vector<std::string> seriesNames(std::span<const OutputMeasure> measures, st
 
 std::string seriesTableText(const SeriesTable& table) {
   std::string text;
-  for (const std::string& line : table.headLines) text += fmt::format("# {}\n", line);
+  for (const std::string& line : table.headLines) text += fmt::format("# {}\n", withValidUtf8(line));
   if (table.initial) {
     text += head::line(head::kInitial, *table.initial, table.isOfInitialParameters ? head::kOfSetup : head::kOfFirst);
   }
@@ -178,6 +188,7 @@ std::string seriesTableText(const SeriesTable& table) {
     add(key::kBest, std::to_string(table.best->number));
     add(key::kBestAggregate, formatReal(table.best->aggregate));
   }
+  add(key::kRows, std::to_string(table.rowCount()));
   text.append(kHeader).append("\n");
   for (const ShownSeries& series : table.series) {
     for (std::size_t i = 0; i < series.seconds.size(); ++i) {

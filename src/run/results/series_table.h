@@ -39,7 +39,11 @@ struct SeriesTable {
                                        ///< succeeded
   std::optional<ShownEvaluation> best;
   std::vector<ShownSeries> series;
+  std::optional<std::size_t> rowsWritten;  ///< as a file says; nothing in those of earlier versions
 
+  std::size_t rowCount() const;
+  /// Whether a file has fewer rows than were written.
+  bool isCutOff() const { return rowsWritten && rowCount() != *rowsWritten; }
   /// Whether it is of a run of that task, as far as the file says.
   bool isOf(std::string_view otherTask) const { return task.empty() || task == otherTask; }
 };

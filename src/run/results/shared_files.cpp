@@ -10,6 +10,7 @@
 #include "common/files.h"
 #include "common/take_text.h"
 #include "common/text.h"
+#include "common/utf8.h"
 #include "run/results/record_file.h"
 
 namespace mirevo {
@@ -81,8 +82,18 @@ std::string runningPrefixThatShares(const std::string& prefix) {
   return {};
 }
 
-std::string keepEarlierResults(const std::string& path, const std::string& setupFile, RunLog& log) {
+void logKept(const std::string& path, const std::string& kept, RunLog& log) {
+  if (!kept.empty()) log.line(fmt::format("{} of an earlier run was kept as {}", fileNameOf(path), kept));
+}
+
+std::string keepEarlierFile(const std::string& path, RunLog& log) {
   std::string kept = keepEarlierFile(path);
+  logKept(path, kept, log);
+  return kept;
+}
+
+std::string keepEarlierResults(const std::string& path, const std::string& setupFile, RunLog& log) {
+  std::string kept = keepEarlierFile(path, log);
   if (kept.empty()) return kept;
   std::string reason;
   const auto head = readFileHead(kept, reason);
@@ -90,13 +101,23 @@ std::string keepEarlierResults(const std::string& path, const std::string& setup
   if (!head) {
     log.warning(
         fmt::format("{}, kept from an earlier run: {}. Whether it is of this setup is not known", kept, reason));
-  } else if (!earlier.empty() && fileNameOf(earlier) != fileNameOf(setupFile)) {
+  } else if (!earlier.empty() && fileNameOf(earlier) != withValidUtf8(fileNameOf(setupFile))) {
     log.warning(fmt::format(
         "{} held results of another setup, {}, which shares this name with {}. They were kept as {}. Give one of the "
         "setups another name",
         path, earlier, setupFile, kept));
   }
   return kept;
+}
+
+void writeBesideResults(const std::string& path, const std::string& text, RunLog& log) {
+  std::string reason;
+  if (readTextFile(path, reason) == text) return;
+  keepEarlierFile(path, log);
+  RecordFile file;
+  file.open(path);
+  file.append(text);
+  file.close();
 }
 
 }  // namespace mirevo

@@ -18,7 +18,16 @@ std::vector<std::string> prefixesThatShare(const std::string& prefix, std::span<
 /// as it shares files with it; empty when there is none.
 std::string runningPrefixThatShares(const std::string& prefix);
 
-/// keepEarlierFile(), with a warning if the head of the file names another setup, whose results then have moved.
+/// Says in the log that `path` of an earlier run was kept as `kept`, unless that is empty.
+void logKept(const std::string& path, const std::string& kept, RunLog& log);
+/// keepEarlierFile() with logKept().
+std::string keepEarlierFile(const std::string& path, RunLog& log);
+
+/// The same, with a warning if the head of the file names another setup, whose results then have moved.
 std::string keepEarlierResults(const std::string& path, const std::string& setupFile, RunLog& log);
+
+/// Writes a text to a file beside the results, as a whole. An existing file with the same content is left as it is; one
+/// with other content is kept under a numbered name. Throws FatalError.
+void writeBesideResults(const std::string& path, const std::string& text, RunLog& log);
 
 }  // namespace mirevo

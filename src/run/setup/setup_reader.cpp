@@ -30,6 +30,20 @@ namespace {
 constexpr std::array<std::string_view, 14> kModelSetupEndings = {
     ".bat", ".cmd", ".sh", ".exe", ".sim", ".mod", ".run", ".inp", ".ini", ".cfg", ".ctl", ".par", ".set", ".dat"};
 
+/// The sections of the measures that compare time series, for those measures that are there.
+std::vector<std::string> seriesSections(const SetupSection& target) {
+  std::vector<std::string> paths;
+  constexpr std::string_view kList = "ObjectiveFunctions/OUTPUT_MEASURES";
+  const auto count = target.peek(kList, kItemCountKeyword);
+  for (int number = 1; count && number <= std::get<std::int32_t>(*count); ++number) {
+    const std::string measure = fmt::format("{}/MEASURE_{}", kList, number);
+    if (!target.holds(measure)) break;
+    if (target.peek(measure, "Interface_Type") != SetupValue(std::int32_t{0})) continue;
+    paths.insert(paths.end(), {measure + "/SIMULATION_FILE", measure + "/OBSERVATION_FILE"});
+  }
+  return paths;
+}
+
 /// One method per section, called in the order of the sections; each checks what it has read before it returns.
 class SetupReader final {
  public:
@@ -89,12 +103,9 @@ class SetupReader final {
 void SetupReader::readSimulationOption() {
   const SetupSection section = target_.open("MIREVO_SIMULATION_OPTION");
   section.read(simulationOptionSection(), config_);
+  file_.need(seriesSections(target_));
   if (config_.task) {
-    // Those that are read whatever the task's own settings are, as its first one.
-    std::vector<const SectionRow*> rows = config_.task->sections();
-    const std::string_view always = rows.front()->readWhen;
-    std::erase_if(rows, [always](const SectionRow* row) { return row->readWhen != always; });
-    file_.need(rows);
+    file_.need(config_.task->neededSections(target_));
   } else {
     section.warn("Option", "no task has this number, nothing will be run");
   }

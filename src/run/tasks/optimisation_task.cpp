@@ -101,6 +101,18 @@ std::vector<const SectionRow*> OptimisationTask::sections() const {
   return rows;
 }
 
+std::vector<std::string> OptimisationTask::neededSections(const SetupSection& target) const {
+  std::vector<std::string> paths{std::string(optimisationSection().row.path)};
+  const auto algorithm = target.peek(paths.front(), kAlgorithmKeyword);
+  const auto chosen = algorithm ? searchMethods().make(*algorithm) : nullptr;
+  if (chosen) paths.emplace_back(chosen->section().row->path);
+  paths.emplace_back(initialSampleSection().row.path);
+  paths.emplace_back(stoppingSection().row.path);
+  const bool hasSurrogate = target.peek(paths.front(), kSurrogateKeyword) == SetupValue(std::int32_t{1});
+  if (hasSurrogate) paths.emplace_back(surrogateSection().row.path);
+  return paths;
+}
+
 void OptimisationTask::read(const TaskReading& reading) {
   const SetupSection section = reading.target.open("OPTIMISATION_ALGORITHM");
   section.read(optimisationSection(), *this);
@@ -153,15 +165,23 @@ void OptimisationTask::readStopping(const SetupSection& section, std::size_t var
   }
   section.check(bound);
   warnOfOneLoop(section);
-  const std::int64_t sampleSize = method->populationSize();
-  if (const auto tooMany = tooManySets(std::min<std::int64_t>(sampleSize, stopping.maxEvaluations), variableCount)) {
+  const std::int64_t populationSize = method->populationSize();
+  if (const auto tooMany =
+          tooManySets(std::min<std::int64_t>(populationSize, stopping.maxEvaluations), variableCount)) {
     section.refuse("Error: Unable to allocate memory in MIREVO setup", kBudgetKeyword,
                    fmt::format("{}, found {} = {} and Max_No_Evaluations = {}", *tooMany,
-                               method->facts().populationKeywords, sampleSize, stopping.maxEvaluations));
+                               method->facts().populationKeywords, populationSize, stopping.maxEvaluations));
   }
-  if (sampleSize <= stopping.maxEvaluations) return;
-  section.warn(kBudgetKeyword, fmt::format("the initial sample of {} sets is cut to {}, and no search follows",
-                                           sampleSize, stopping.maxEvaluations));
+  const std::int64_t sampleSize = method->sampleSize(initialSample, stopping.maxEvaluations);
+  if (sampleSize > stopping.maxEvaluations) {
+    section.warn(kBudgetKeyword, fmt::format("the initial sample of {} sets is cut to {}, and no search follows",
+                                             sampleSize, stopping.maxEvaluations));
+  } else if (sampleSize == stopping.maxEvaluations && method->populationSize() == 0) {
+    // A population that just fits may be meant as a sample.
+    section.warn(kBudgetKeyword, fmt::format("{} used up by the start of the search, and no search follows",
+                                             sampleSize == 1 ? "the only evaluation is"
+                                                             : fmt::format("the {} evaluations are", sampleSize)));
+  }
 }
 
 void OptimisationTask::readSurrogate(const TaskReading& reading, const SetupSection& section,

@@ -16,6 +16,7 @@ class OptimisationTask final : public Task {
  public:
   const TaskFacts& facts() const override;
   std::vector<const SectionRow*> sections() const override;
+  std::vector<std::string> neededSections(const SetupSection& target) const override;
   void read(const TaskReading& reading) override;
   bool mayHaveInitialSample() const override { return true; }
   std::string description() const override;

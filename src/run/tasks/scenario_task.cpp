@@ -90,6 +90,13 @@ std::vector<const SectionRow*> ScenarioTask::sections() const {
   return {&scenarioSection().row, &listSection(), &runSection().row};
 }
 
+std::vector<std::string> ScenarioTask::neededSections(const SetupSection& target) const {
+  std::vector<std::string> paths{std::string(scenarioSection().row.path)};
+  const auto type = target.peek(paths.front(), "Scenario_Type");
+  if (type == SetupValue(std::int32_t{1})) paths.emplace_back(listSection().path);
+  return paths;
+}
+
 void ScenarioTask::read(const TaskReading& reading) {
   const SetupSection section = reading.target.open("SCENARIOS");
   section.read(scenarioSection(), settings);

@@ -21,6 +21,7 @@ class ScenarioTask final : public Task {
  public:
   const TaskFacts& facts() const override;
   std::vector<const SectionRow*> sections() const override;
+  std::vector<std::string> neededSections(const SetupSection& target) const override;
   void read(const TaskReading& reading) override;
   std::vector<double> givenValues(std::size_t parameter) const override;
   std::string description() const override;

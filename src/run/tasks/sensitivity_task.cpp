@@ -154,6 +154,10 @@ std::vector<const SectionRow*> SensitivityTask::sections() const {
   return {&sensitivitySection().row, &localSensitivitySection().row};
 }
 
+std::vector<std::string> SensitivityTask::neededSections(const SetupSection& /*target*/) const {
+  return {std::string(sensitivitySection().row.path), std::string(localSensitivitySection().row.path)};
+}
+
 void SensitivityTask::read(const TaskReading& reading) {
   const SetupSection section = reading.target.open("SENSITIVITY_ANALYSIS");
   section.read(sensitivitySection(), *this);

@@ -12,6 +12,7 @@ class SensitivityTask final : public Task {
  public:
   const TaskFacts& facts() const override;
   std::vector<const SectionRow*> sections() const override;
+  std::vector<std::string> neededSections(const SetupSection& target) const override;
   void read(const TaskReading& reading) override;
   std::string description() const override;
   int plannedEvaluations(std::size_t variableCount) const override;

@@ -18,6 +18,10 @@ std::vector<std::string> Task::summaryLines(const SearchSpace& /*space*/) const 
   return {};
 }
 
+std::vector<std::string> Task::neededSections(const SetupSection& /*target*/) const {
+  return {std::string(sections().front()->path)};
+}
+
 std::vector<double> Task::givenValues(std::size_t /*parameter*/) const {
   return {};
 }

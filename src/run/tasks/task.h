@@ -109,6 +109,8 @@ class Task {
   virtual const TaskFacts& facts() const = 0;
   /// Its sections with their keywords, in reading order, for the schema of setups.
   virtual std::vector<const SectionRow*> sections() const = 0;
+  /// The paths of those that a setup needs, as far as that can be told before they are read; `target` holds them.
+  virtual std::vector<std::string> neededSections(const SetupSection& target) const;
   /// Reads and checks its sections. Throws FatalError.
   virtual void read(const TaskReading& reading) = 0;
   /// The values that its sections give for a parameter, by its 0-based position; runs get them exactly.

@@ -55,6 +55,20 @@ std::vector<const SectionRow*> UncertaintyTask::sections() const {
   return {&uncertaintySection().row, &distributionSection().row};
 }
 
+std::vector<std::string> UncertaintyTask::neededSections(const SetupSection& target) const {
+  constexpr std::string_view kParameters = "MODEL_PARAMETERS";
+  std::vector<std::string> paths{std::string(uncertaintySection().row.path)};
+  const auto count = target.peek(kParameters, kItemCountKeyword);
+  int variable = 0;
+  for (int number = 1; count && number <= std::get<std::int32_t>(*count); ++number) {
+    const std::string parameter = fmt::format("{}/PARAMETER_{}", kParameters, number);
+    if (!target.holds(parameter)) break;
+    if (target.peek(parameter, "Parameter_Type") != SetupValue(std::int32_t{0})) continue;
+    paths.push_back(fmt::format("{}/PARAMETER_{}", paths.front(), ++variable));
+  }
+  return paths;
+}
+
 void UncertaintyTask::read(const TaskReading& reading) {
   const SetupSection section = reading.target.open("UNCERTAINTY_ESTIMATION");
   UncertaintySection filled{settings, randomSeed};

@@ -10,6 +10,7 @@ class UncertaintyTask final : public Task {
  public:
   const TaskFacts& facts() const override;
   std::vector<const SectionRow*> sections() const override;
+  std::vector<std::string> neededSections(const SetupSection& target) const override;
   void read(const TaskReading& reading) override;
   std::string description() const override;
   std::vector<std::string> summaryLines(const SearchSpace& space) const override;

@@ -99,6 +99,7 @@ TEST(InitialSample, ReadsASampleOnTheModelScaleWithColumnsInAnyOrder) {
 TEST(InitialSample, NamesTheLineOfWhatIsWrongInAFile) {
   const std::vector<std::pair<std::string, std::string>> cases{
       {"", "s.txt: expected a header of parameter names and one set a row, found nothing"},
+      {"\xFF\xFEk", "s.txt: the file is UTF-16 text; save it as UTF-8"},
       {"k layers n\n", "found a header alone"},
       {"k layer n\n", "s.txt:1: \"layer\" is not the name of a variable parameter; did you mean \"layers\"?"},
       {"#\nk layers\n1 1\n", "s.txt:2: no column for parameter \"n\""},

@@ -26,7 +26,9 @@ TEST_F(RunLogTest, LinesBeforeOpeningComeFirstAndAnOlderFileIsReplaced) {
   ASSERT_TRUE(log_.open(path_, reason_)) << reason_;
   EXPECT_EQ(content(), "before\nWarning: early\n");
   log_.line("two\nlines");
-  EXPECT_EQ(content(), "before\nWarning: early\ntwo\nlines\n") << "a record is on disk when the call returns";
+  log_.line("gr\xFCn");
+  EXPECT_EQ(content(), "before\nWarning: early\ntwo\nlines\ngr\xEF\xBF\xBDn\n")
+      << "a record is on disk when the call returns";
 }
 
 TEST_F(RunLogTest, WarningsAreCountedKeptAndPassedOn) {

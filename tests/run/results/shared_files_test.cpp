@@ -1,5 +1,7 @@
 #include "run/results/shared_files.h"
 
+#include <tuple>
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -33,12 +35,14 @@ TEST(SharedFiles, AreThoseOfSetupsNamedAfterAResultOfAnother) {
 
 TEST(SharedFiles, KeptResultsOfAnotherSetupAreToldOf) {
   const TemporaryFolder folder;
-  for (const auto& [setup, warnings] : {std::pair{"/old/x.kdx", 0}, {"/old/x_Optimisation.kdx", 1}}) {
+  const std::tuple<const char*, const char*, int> cases[] = {
+      {"/old/x.kdx", "x.kdx", 0}, {"/old/x_Optimisation.kdx", "x.kdx", 1}, {"/old/\xEF\xBF\xBD.kdx", "\xE4.kdx", 0}};
+  for (const auto& [named, setup, warnings] : cases) {
     const std::string path =
-        folder.write("x_Optimisation.dat", std::string("# Title\n# Setup file: ") + setup + "\n1\tOK\n");
+        folder.write("x_Optimisation.dat", std::string("# Title\n# Setup file: ") + named + "\n1\tOK\n");
     RunLog log;
-    EXPECT_THAT(keepEarlierResults(path, folder / "x.kdx", log), HasSubstr("/x_Optimisation."));
-    EXPECT_EQ(log.warningCount(), warnings) << setup;
+    EXPECT_THAT(keepEarlierResults(path, folder / setup, log), HasSubstr("/x_Optimisation."));
+    EXPECT_EQ(log.warningCount(), warnings) << named;
   }
 }
 

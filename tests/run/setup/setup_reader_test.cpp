@@ -96,6 +96,26 @@ TEST_F(SetupReaderTest, RefusesWhatCannotBeReadAndSaysWhere) {
        "MIREVO_PARAMETERS\nsections to add:\n   in [MIREVO_PARAMETERS]:\n   [SAVE_OUTPUT_FILES]\n   "
        "[/SAVE_OUTPUT_FILES]\n   in [OPTIMISATION_ALGORITHM]:\n   [STOPPING_CRITERIA]\n     Max_No_Evaluations = ...\n "
        "  [/STOPPING_CRITERIA]"},
+      {"[SAVE_OUTPUT_FILES] => [Saved] & [/SAVE_OUTPUT_FILES] => [/Saved] & Option = 2 => 3 & [UNCERTAINTY_ESTIMATION] "
+       "=> [U] & [/UNCERTAINTY_ESTIMATION] => [/U]",
+       " section SAVE_OUTPUT_FILES in KDX file\nsetup.kdx:1:1: expected section [SAVE_OUTPUT_FILES] in section "
+       "MIREVO_PARAMETERS\nsections to add:\n   in [MIREVO_PARAMETERS]:\n   [SAVE_OUTPUT_FILES]\n   "
+       "[/SAVE_OUTPUT_FILES]\n   in [MIREVO_PARAMETERS]:\n   [UNCERTAINTY_ESTIMATION]\n     Uncertainty_Type = ...\n   "
+       " "
+       " Sample_Size = ...\n   [/UNCERTAINTY_ESTIMATION]\n   in [UNCERTAINTY_ESTIMATION]:\n   [PARAMETER_1]\n     "
+       "Mean_Value = ...\n     Standard_Deviation = ...\n   [/PARAMETER_1]\n   in [UNCERTAINTY_ESTIMATION]:\n   "
+       "[PARAMETER_2]\n     Mean_Value = ...\n     Standard_Deviation = ...\n   [/PARAMETER_2]"},
+      {"[SAVE_OUTPUT_FILES] => [Saved] & [/SAVE_OUTPUT_FILES] => [/Saved] & [PSE_CONTROL_PARAMETERS] => [P] & "
+       "[/PSE_CONTROL_PARAMETERS] => [/P] & [SURROGATE_MODEL_PARAMETERS] => [S] & [/SURROGATE_MODEL_PARAMETERS] => "
+       "[/S] & [OBSERVATION_FILE] => [O] & [/OBSERVATION_FILE] => [/O]",
+       " section OBSERVATION_FILE in KDX file\nsetup.kdx:63:7: expected section [OBSERVATION_FILE] in section MEASURE_1"
+       "\nsections to add:\n   in [ObjectiveFunctions/OUTPUT_MEASURES/MEASURE_1]:\n   [OBSERVATION_FILE]\n     "
+       "File_Name = ...\n   [/OBSERVATION_FILE]\n   in [MIREVO_PARAMETERS]:\n   [SAVE_OUTPUT_FILES]\n   "
+       "[/SAVE_OUTPUT_FILES]\n   in [OPTIMISATION_ALGORITHM]:\n   [PSE_CONTROL_PARAMETERS]\n     Population_Size = "
+       "...\n     "
+       "No_Points_Simplex = ...\n   [/PSE_CONTROL_PARAMETERS]\n   in [OPTIMISATION_ALGORITHM]:\n   "
+       "[SURROGATE_MODEL_PARAMETERS]\n   "
+       "[/SURROGATE_MODEL_PARAMETERS]"},
   };
   for (const auto& [edits, error] : others) EXPECT_EQ(failure(edits), std::string("Error: Unable to open") + error);
   EXPECT_EQ(failure(title(longText.substr(1) + "   ")), "") << "trailing blanks do not count";
@@ -275,6 +295,9 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatAreSeldomMeant)
       {"Algorithm_Type = 1 => 2 & Use_Surrogate_Model = 1 => 0 & NoSimultaneousSim = 4 => 1 & "
        "Perturbation_Parameter = 0.25 => 0",
        "Perturbation_Parameter: 0 perturbs nothing: every candidate is the best start set again"},
+      {"Algorithm_Type = 1 => 2 & Use_Surrogate_Model = 1 => 0 & NoSimultaneousSim = 4 => 1 & "
+       "Max_No_Evaluations = 500 => 1",
+       "Max_No_Evaluations: the only evaluation is used up by the start of the search, and no search follows"},
       {"Algorithm_Type = 1 => 2 & Max_No_Evaluations = 500 => 10",
        "Dynamically Dimensioned Search uses no surrogate model: the search is the same as with 0, "},
   };
