@@ -72,11 +72,11 @@ void warnOfNoWidth(const TaskContext& context, const SearchSummary& summary, std
   const std::int64_t proposed =
       populationSize > 0 ? std::min<std::int64_t>(populationSize, summary.evaluationCount) : summary.evaluationCount;
   if (returned == 0 || returned < proposed || returned < summary.replacedCount) return;
-  context.log.warning(
-      fmt::format("{} of {} points that violated a constraint could only be replaced by a set already evaluated: do "
-                  "the constraints leave any width? A parameter that must equal an expression of others is one with "
-                  "Parameter_Type = 2",
-                  summary.returnedCount, summary.replacedCount));
+  context.log.warning(fmt::format(
+      "{} of {} points that cannot be run could only be replaced by a set already evaluated: do "
+      "constraints and equations leave any width? A parameter that must equal an expression of others is one with "
+      "Parameter_Type = 2",
+      summary.returnedCount, summary.replacedCount));
 }
 
 void logBestSet(const TaskContext& context, const ParameterSet& best, const EvaluationResult& result) {
@@ -263,9 +263,10 @@ TaskOutcome OptimisationTask::run(const TaskContext& context) {
   context.log.line("");
   context.log.line(summary.terminationMessage);
   if (summary.replacedCount > 0) {
-    context.log.line(
-        fmt::format("Proposed points that violated a constraint and were replaced before their evaluation: {}",
-                    summary.replacedCount));
+    context.log.line(fmt::format(
+        "Proposed points that cannot be run (a constraint is violated, or an equation has no finite value) and were "
+        "replaced before their evaluation: {}",
+        summary.replacedCount));
   }
   warnOfNoWidth(context, summary, method->populationSize());
   const std::vector<ParameterSet> best{summary.best};

@@ -62,7 +62,7 @@ struct TaskContext {
   std::span<const ObservedSeries> observedSeries = {};
   /// By model parameter, the width of the widest placeholder into which it is written; 0: none.
   std::vector<int> fieldWidths = {};
-  Feasibility feasibility = {};  ///< which sets can be run, of a model with constraints
+  Feasibility feasibility = {};  ///< which sets can be run, of a model with constraints or equations
   /// Shows the user a warning that the log receives as well. May be empty.
   std::function<void(std::string_view)> warnUser = {};
 };

@@ -120,8 +120,8 @@ std::vector<ParameterSet> UncertaintyTask::drawSample(const TaskContext& context
   context.log.line(acceptance);
   if (rate < 1.0) {
     context.log.warning(
-        "The constraints leave less than 1 % of the sets drawn: the distributions of those that can be "
-        "run may have little in common with the ones requested. Are means and constraints right?");
+        "Less than 1 % of the sets drawn can be run: their distributions may have little in common with the ones "
+        "requested. Are means, standard deviations, constraints and equations right?");
   }
   return std::move(sample.sets);
 }
