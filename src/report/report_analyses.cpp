@@ -210,6 +210,7 @@ std::optional<ReportedCovariance> reportedCovariance(const std::string& filePref
     return std::nullopt;
   }
   ReportedCovariance found;
+  found.correlationFile = fileNameOf(correlationFile);
   for (const std::vector<std::string>& cells : limits.rows) {
     if (!cells[*leftOut].empty()) {
       found.leftOut.push_back(cells.front());

@@ -96,6 +96,7 @@ struct ReportedCovariance {
   std::vector<double> lower95;
   std::vector<double> upper95;
   std::vector<std::vector<double>> correlation;
+  std::string correlationFile;       ///< its name
   std::vector<std::string> leftOut;  ///< parameters without a variance
 };
 

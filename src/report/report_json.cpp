@@ -4,6 +4,7 @@
 
 #include <fmt/core.h>
 
+#include "algorithms/numbers/sample_summary.h"
 #include "common/calendar.h"
 #include "measures/fit_figures.h"
 #include "report/json_writer.h"
@@ -196,7 +197,16 @@ void writeSensitivity(JsonWriter& json, const ReportedSensitivity& sensitivity) 
     json.key("standardDeviation").numbers(covariance.standardDeviation, Digits::table);
     json.key("lower95").numbers(covariance.lower95, Digits::table);
     json.key("upper95").numbers(covariance.upper95, Digits::table);
-    json.key("correlation").rows(covariance.correlation, Digits::drawn);
+    const bool isShown = covariance.names.size() <= kMostShownParameters;
+    json.key("correlation").rows(isShown ? covariance.correlation : std::vector<std::vector<double>>{}, Digits::drawn);
+    if (!isShown) {
+      json.key("largestCorrelations").beginArray();
+      for (const auto& [i, j] : largestEntries(covariance.correlation)) {
+        json.beginObject().member("first", covariance.names[i]).member("second", covariance.names[j]);
+        json.member("value", covariance.correlation[i][j]).endObject();
+      }
+      json.endArray().member("correlationFile", covariance.correlationFile);
+    }
     json.member("leftOut", covariance.leftOut).endObject();
   } else {
     json.null();

@@ -96,6 +96,24 @@ TEST(LocalSensitivity, KnowsTheRoundingOfValuesBetweenTheObservations) {
                                                   "be told from that of the parameters before it"));
 }
 
+/// A row of the list of parameters: `value` from 0 to 10,000.
+std::string parameterSection(std::size_t i, const std::string& value) {
+  return fmt::format(
+      "[PARAMETER_{0}]\nInitial_Value = {1}\nLower_Bound = 0\nUpper_Bound = 1E4\nTransformation_Type = 0\n"
+      "Parameter_Type = 0\nParameter_IDValue = {0}.5E-035\nParameter_Name = 'b{0}'\nParameter_Equation = ''\n"
+      "Comment = ''\n[Keywords]\n[/Keywords]\n[/PARAMETER_{0}]\n",
+      i, value);
+}
+
+/// Puts these sections in the place of the parameters of the setup.
+void useParameters(const ModelFolder& folder, std::size_t count, const std::string& sections) {
+  std::string text = folder.read("basin.kdx");
+  const auto from = text.find("TqSEKdxListItemCount", text.find("[MODEL_PARAMETERS]"));
+  text.replace(from, text.find("[INTERNAL_CONSTRAINTS]") - from,
+               fmt::format("TqSEKdxListItemCount = {}\n{}", count, sections));
+  folder.write("basin.kdx", text);
+}
+
 /// A regression problem with certified results.
 struct CertifiedProblem {
   const char* formula;                                    ///< of b[1], b[2], ... and x, for awk
@@ -108,7 +126,7 @@ std::vector<double> deviationsOf(const CertifiedProblem& problem, const std::str
   const ModelFolder folder;
   std::string observed = "time,y\n";
   std::string times;
-  std::string texts = fmt::format("TqSEKdxListItemCount = {}\n", problem.certified.size());
+  std::string texts;
   std::string lines = "!\n";
   std::istringstream data(problem.data);
   std::string x;
@@ -118,11 +136,7 @@ std::vector<double> deviationsOf(const CertifiedProblem& problem, const std::str
     times += fmt::format("2001-{:02}-{:02} {}\n", i / 28 + 1, i % 28 + 1, x);
   }
   for (std::size_t i = 1; i <= problem.certified.size(); ++i) {
-    texts += fmt::format(
-        "[PARAMETER_{0}]\nInitial_Value = {1}\nLower_Bound = 0\nUpper_Bound = 1E4\nTransformation_Type = 0\n"
-        "Parameter_Type = 0\nParameter_IDValue = {0}.5E-035\nParameter_Name = 'b{0}'\nParameter_Equation = ''\n"
-        "Comment = ''\n[Keywords]\n[/Keywords]\n[/PARAMETER_{0}]\n",
-        i, problem.certified[i - 1].first);
+    texts += parameterSection(i, problem.certified[i - 1].first);
     lines += fmt::format("!b{}               !\n", i);
   }
   folder.write("observed.csv", observed);
@@ -136,10 +150,7 @@ std::vector<double> deviationsOf(const CertifiedProblem& problem, const std::str
                   problem.formula),
       0755);
   const std::string setup = folder.writeSetup({.option = 1});
-  std::string text = folder.read("basin.kdx");
-  const auto from = text.find("TqSEKdxListItemCount", text.find("[MODEL_PARAMETERS]"));
-  text.replace(from, text.find("[INTERNAL_CONSTRAINTS]") - from, texts);
-  folder.write("basin.kdx", text);
+  useParameters(folder, problem.certified.size(), texts);
   folder.editSetup("Fraction = 0.005", "Fraction = " + fraction);
   const ProgramResult run = runProgram({setup});
   EXPECT_EQ(run.exitCode, 0) << run.error;
@@ -181,6 +192,44 @@ TEST(LocalSensitivity, ReproducesCertifiedStandardDeviations) {
         EXPECT_NEAR(deviations[i] / problem.certified[i].second, 1.0, 1e-6) << "b" << i + 1 << " at " << fraction;
       }
     }
+  }
+}
+
+TEST(Correlation, OfMoreThanTenParametersIsATableOfItsOwnWithItsLargestEntriesInLogAndReport) {
+  constexpr std::size_t kCount = 11;
+  const ModelFolder folder;
+  std::string lines = "!\n";
+  std::string parameters;
+  std::string distributions = "    [/PARAMETER_2]\n";
+  for (std::size_t i = 1; i <= kCount; ++i) {
+    lines += fmt::format("!b{}               !\n", i);
+    parameters += parameterSection(i, "5");
+    if (i < 3) continue;
+    distributions += fmt::format("[PARAMETER_{0}]\nMean_Value = 5\nStandard_Deviation = 1\n[/PARAMETER_{0}]\n", i);
+  }
+  folder.write("model/parameters.tpl", lines);
+  folder.write("model/run.sh",
+               "#!/bin/sh\nawk '{ b[NR] = $1 } END { print \"time,y\"\n"
+               "  for (t = 1; t <= 28; ++t) { y = 0; for (i = 1; i <= NR; ++i) y += b[i] * cos(i * t)\n"
+               "    printf \"2001-01-%02d,%.17g\\n\", t, y } }' parameters.txt >simulated.csv\n",
+               0755);
+  const std::pair<int, const char*> cases[] = {{1, "basin_Correlation.dat"}, {3, "basin_SampleCorrelation.dat"}};
+  for (const auto& [option, file] : cases) {
+    const std::string setup = folder.writeSetup({.option = option});
+    useParameters(folder, kCount, parameters);
+    folder.editSetup("    [/PARAMETER_2]\n  [/UNCERTAINTY", distributions + "  [/UNCERTAINTY");
+    const ProgramResult run = runProgram({setup});
+    ASSERT_EQ(run.exitCode, 0) << run.error << folder.read("basin.log");
+    const std::string told = fmt::format("All correlations of the 11 parameters are in {}", file);
+    const std::string results = folder.read(RunSettings{.option = option}.resultFile());
+    EXPECT_EQ(occurrences(folder.read("basin.log"), told), 1);
+    EXPECT_EQ(occurrences(results, told), 1);
+    EXPECT_FALSE(std::isnan(cellOf(folder.read(file), {"b11"}, "b1")));
+    if (option != 1) continue;
+    EXPECT_THAT(results, HasSubstr("The covariance of the 11 parameters (search scale) is in basin_Covariance.dat"));
+    if (!folder.exists("basin_Report.html")) continue;  // in a build without its page
+    EXPECT_THAT(folder.read("basin_Report.html"),
+                ::testing::ContainsRegex("\"correlation\":\\[\\],\"largestCorrelations\":\\[\\{\"first\":\"b"));
   }
 }
 

@@ -72,6 +72,32 @@ TEST_F(Mpi, AJobWritesTheResultsOfAPlainRun) {
   }
 }
 
+// exp(ln(5)) is 4.999999999999999, and exp(ln(10)) is above 10.
+TEST_F(Mpi, ASampleFileOfALogarithmicParameterIsRunAsItIsWritten) {
+  const std::vector<std::string> given{"5", "10", "1", "3", "7", "9.7", "2.2", "6", "8.3", "9"};
+  std::string sample = "a b\n";
+  for (const std::string& value : given) sample += value + " 2\n";
+  folder_.write("sample.txt", sample);
+  for (const auto& [algorithm, processes] : {std::pair(0, 1), std::pair(1, 1), std::pair(0, 3), std::pair(1, 3)}) {
+    const std::string setup =
+        folder_.writeSetup({.algorithm = algorithm, .includesInitial = false, .maxEvaluations = 10});
+    folder_.editSetup("Lower_Bound = 0.0\n      Upper_Bound = 10.0\n      Transformation_Type = 0",
+                      "Lower_Bound = 1.0\n      Upper_Bound = 10.0\n      Transformation_Type = 1");
+    folder_.editSetup("Initial_Sample_Generation = 0", "Initial_Sample_Generation = 4");
+    folder_.editSetup("File_Name = ''\n    [/INITIAL", "File_Name = 'sample.txt'\n    [/INITIAL");
+    folder_.editSetup("Count = 0\n    [/INTERNAL",
+                      "Count = 1\n      [CONSTRAINT_1]\n        Left_Equation = 'a'\n        Right_Equation = '10'\n"
+                      "        Logical_Operator = 1\n      [/CONSTRAINT_1]\n    [/INTERNAL");
+    const ProgramResult run = processes == 1 ? runProgram({setup}) : runJob(processes, {setup});
+    ASSERT_EQ(run.exitCode, 0) << run.error << log();
+    const auto rows = readDataTable(folder_.read("basin_Optimisation.dat")).rows;
+    ASSERT_GT(rows.size(), given.size());
+    for (std::size_t i = 0; i < given.size(); ++i) {
+      EXPECT_EQ(rows[i][1] + " " + rows[i][2], "OK " + given[i]) << algorithm << " " << processes;
+    }
+  }
+}
+
 // Its ranks make their process folders while the others do so and the master opens its files, all in one folder, which
 // is the one that they copy. What they copy of it is the model, whatever earlier runs have left there.
 TEST_F(Mpi, ASetupBesideItsModelIsRunByManyRanks) {

@@ -330,7 +330,7 @@ DataTable jacobianTable(const LinearisedModel& model, const SearchSpace& space,
 }
 
 std::vector<std::string> formatCovariance(const ParameterCovariance& covariance, const SearchSpace& space,
-                                          std::span<const double> set) {
+                                          std::span<const double> set, std::string_view filePrefix) {
   std::vector<std::string> lines;
   lines.push_back(fmt::format("Parameter covariance: {} observations, {} parameters, {} degrees of freedom",
                               covariance.observationCount, covariance.kept.size(), covariance.degreesOfFreedom));
@@ -364,8 +364,19 @@ std::vector<std::string> formatCovariance(const ParameterCovariance& covariance,
   }
   const std::string headings[] = {"Value", "Std. deviation", "95 % lower", "95 % upper"};
   append("Parameter (model scale)", headings, rows);
-  append("Covariance (search scale)", names, covariance.covariance);
-  append("Correlation", names, covariance.correlation);
+  const auto fileName = [&](const RunFile& file) { return fileNameOf(runFilePath(filePrefix, file)); };
+  if (names.size() <= kMostShownParameters) {
+    append("Covariance (search scale)", names, covariance.covariance);
+  } else {
+    lines.emplace_back();
+    lines.push_back(fmt::format("   The covariance of the {} parameters (search scale) is in {}", names.size(),
+                                fileName(run_files::kCovariance)));
+  }
+  lines.emplace_back();
+  for (std::string& line :
+       formatCorrelation("Correlation", names, covariance.correlation, fileName(run_files::kCorrelation))) {
+    lines.push_back(std::move(line));
+  }
   for (std::size_t i = 0; i < names.size(); ++i) {
     for (std::size_t j = 0; j < i; ++j) {
       if (!(std::abs(covariance.correlation[i][j]) > kWarnAboveCorrelation)) continue;

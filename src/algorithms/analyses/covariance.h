@@ -3,6 +3,7 @@
 #include <cstddef>
 #include <span>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "common/data_table.h"
@@ -80,8 +81,10 @@ struct ObservationLabel {
 DataTable jacobianTable(const LinearisedModel& model, const SearchSpace& space,
                         std::span<const ObservationLabel> observations);
 
-/// The covariance analysis as lines of text for the log, with a warning for each |r| > 0.95.
+/// The covariance analysis as lines of text for the log, with a warning for each |r| > 0.95. Of more parameters than
+/// kMostShownParameters it has the largest correlations alone and names the files of the matrices, whose names begin
+/// with `filePrefix`.
 std::vector<std::string> formatCovariance(const ParameterCovariance& covariance, const SearchSpace& space,
-                                          std::span<const double> set);
+                                          std::span<const double> set, std::string_view filePrefix = {});
 
 }  // namespace mirevo

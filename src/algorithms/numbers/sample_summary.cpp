@@ -119,12 +119,9 @@ std::vector<std::string> formatTable(const std::string& corner, std::span<const 
   return lines;
 }
 
-std::vector<std::string> formatCorrelation(const std::string& title, std::span<const std::string> names,
-                                           std::span<const std::vector<double>> matrix, std::string_view file) {
-  constexpr std::size_t kMostInTable = 10;
+std::vector<MatrixEntry> largestEntries(std::span<const std::vector<double>> matrix) {
   constexpr std::size_t kLargestShown = 10;
-  if (matrix.size() <= kMostInTable) return formatTable(title, names, names, matrix);
-  std::vector<std::pair<std::size_t, std::size_t>> entries;
+  std::vector<MatrixEntry> entries;
   for (std::size_t i = 0; i < matrix.size(); ++i) {
     for (std::size_t j = i + 1; j < matrix.size(); ++j) {
       if (!std::isnan(matrix[i][j])) entries.emplace_back(i, j);
@@ -134,9 +131,15 @@ std::vector<std::string> formatCorrelation(const std::string& title, std::span<c
     return std::abs(matrix[a.first][a.second]) > std::abs(matrix[b.first][b.second]);
   });
   if (entries.size() > kLargestShown) entries.resize(kLargestShown);
+  return entries;
+}
+
+std::vector<std::string> formatCorrelation(const std::string& title, std::span<const std::string> names,
+                                           std::span<const std::vector<double>> matrix, std::string_view file) {
+  if (matrix.size() <= kMostShownParameters) return formatTable(title, names, names, matrix);
   std::vector<std::string> pairs;
   std::vector<std::vector<double>> values;
-  for (const auto& [i, j] : entries) {
+  for (const auto& [i, j] : largestEntries(matrix)) {
     pairs.push_back(fmt::format("{}, {}", names[i], names[j]));
     values.push_back({matrix[i][j]});
   }

@@ -4,6 +4,7 @@
 #include <span>
 #include <string>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 #include "common/data_table.h"
@@ -44,8 +45,17 @@ DataTable matrixTable(const RunFile& file, std::string headLine, std::span<const
 std::vector<std::string> formatTable(const std::string& corner, std::span<const std::string> headings,
                                      std::span<const std::string> names, std::span<const std::vector<double>> rows);
 
-/// A correlation matrix as lines of text: the table of up to 10 parameters; of more the 10 entries with the largest
-/// absolute values alone, as a large table is written once, to `file`.
+/// Log, result file and report show a matrix of up to this many parameters; a larger one is written once, to a table of
+/// its own.
+inline constexpr std::size_t kMostShownParameters = 10;
+
+/// The two parameters of an entry of a matrix, 0-based, row below column.
+using MatrixEntry = std::pair<std::size_t, std::size_t>;
+/// The 10 entries above the diagonal with the largest absolute values, the largest first; NaN is left out.
+std::vector<MatrixEntry> largestEntries(std::span<const std::vector<double>> matrix);
+
+/// A correlation matrix as lines of text: the table of up to kMostShownParameters; of more the largestEntries() alone
+/// and the name of the `file` that has all.
 std::vector<std::string> formatCorrelation(const std::string& title, std::span<const std::string> names,
                                            std::span<const std::vector<double>> matrix, std::string_view file);
 

@@ -127,13 +127,15 @@ std::optional<double> toSearchScale(double value, std::size_t j, const SearchSpa
   return std::clamp(transformed, lower, upper);
 }
 
-ParameterSet readRow(const std::vector<std::string_view>& cells, const std::vector<std::size_t>& parameters,
-                     const std::string& place, const SearchSpace& space) {
+/// Adds the set of a row to the sample.
+void readRow(const std::vector<std::string_view>& cells, const std::vector<std::size_t>& parameters,
+             const std::string& place, const SearchSpace& space, GivenSample& sample) {
   if (cells.size() != parameters.size()) {
     fatalError(kInvalidFile, fmt::format("{}: found {} values, expected {}, one for each name in the header", place,
                                          cells.size(), parameters.size()));
   }
-  ParameterSet set(space.size());
+  ParameterSet& set = sample.sets.emplace_back(space.size());
+  ParameterSet& given = sample.modelScale.emplace_back(space.size());
   for (std::size_t column = 0; column < cells.size(); ++column) {
     const std::size_t j = parameters[column];
     const std::optional<double> value = parseReal(cells[column]);
@@ -147,8 +149,8 @@ ParameterSet readRow(const std::vector<std::string_view>& cells, const std::vect
                                            cells[column], space.names[j]));
     }
     set[j] = *transformed;
+    given[j] = *value;
   }
-  return set;
 }
 
 }  // namespace
@@ -228,12 +230,11 @@ std::size_t givenSetCount(const InitialSampleSettings& settings, std::size_t cou
   return settings.includeInitialParameters ? std::min<std::size_t>(1, count) : 0;
 }
 
-std::vector<ParameterSet> readInitialSample(std::string_view fileName, std::string_view text,
-                                            const SearchSpace& space) {
+GivenSample readInitialSample(std::string_view fileName, std::string_view text, const SearchSpace& space) {
   if (const std::string fault = faultOfEncoding(text); !fault.empty()) {
     fatalError(kInvalidFile, fmt::format("{}: {}", fileName, fault));
   }
-  std::vector<ParameterSet> sets;
+  GivenSample sample;
   std::optional<RowSplitter> splitter;
   std::vector<std::size_t> parameters;
   int lineNumber = 0;
@@ -246,17 +247,17 @@ std::vector<ParameterSet> readInitialSample(std::string_view fileName, std::stri
       splitter.emplace(line);
       parameters = parametersOfColumns((*splitter)(line), place, space);
     } else {
-      sets.push_back(readRow((*splitter)(line), parameters, place, space));
+      readRow((*splitter)(line), parameters, place, space, sample);
     }
   }
-  if (sets.empty()) {
+  if (sample.sets.empty()) {
     fatalError(kInvalidFile, fmt::format("{}: expected a header of parameter names and one set a row, found {}",
                                          fileName, splitter ? "a header alone" : "nothing"));
   }
-  return sets;
+  return sample;
 }
 
-std::vector<ParameterSet> loadInitialSample(const std::string& fileName, const SearchSpace& space) {
+GivenSample loadInitialSample(const std::string& fileName, const SearchSpace& space) {
   std::string reason;
   const std::optional<std::string> text = readTextFile(fileName, reason);
   if (!text) fatalError(kInvalidFile, fmt::format("{}: {}", fileName, reason));

@@ -44,8 +44,14 @@ inline constexpr std::string_view kInitialSampleFileKeyword = "Initial_Sample_Fi
 /// parameter.
 SearchBounds searchBounds(const SearchSpace& space);
 
+/// A sample that the setup gives, in setup order.
+struct GivenSample {
+  std::vector<ParameterSet> sets;        ///< search scale
+  std::vector<ParameterSet> modelScale;  ///< the same as given
+};
+
 /// Draws `count` sets within the bounds; with `includeInitialParameters` the first is the initial set, followed by a
-/// sample of count − 1. For a sample from a file `givenSets` is what readInitialSample() returned; its first sets are
+/// sample of count − 1. For a sample from a file `givenSets` are those of readInitialSample(); the first of them are
 /// used. Throws FatalError when there are too few.
 std::vector<ParameterSet> drawInitialSample(const InitialSampleSettings& settings,
                                             std::span<const ParameterSet> givenSets, const SearchBounds& bounds,
@@ -56,13 +62,12 @@ std::size_t givenSetCount(const InitialSampleSettings& settings, std::size_t cou
 
 /// Reads a sample: a header row with the names of the variable parameters in any order, then one set per row on the
 /// model scale; blank lines and lines that start with `#` are skipped. Columns are separated by tabs, semicolons,
-/// commas or blanks: the first of these, in this order, that the header contains. Returns the sets on the search scale,
-/// in setup order. Throws FatalError ("Error: Initial sample file invalid") with file and line for names that are
-/// unknown, missing or repeated, values that are not numbers or are outside their bounds, rows of a different length
-/// from the header, and a file without rows.
-std::vector<ParameterSet> readInitialSample(std::string_view fileName, std::string_view text, const SearchSpace& space);
+/// commas or blanks: the first of these, in this order, that the header contains. Throws FatalError ("Error: Initial
+/// sample file invalid") with file and line for names that are unknown, missing or repeated, values that are not
+/// numbers or are outside their bounds, rows of a different length from the header, and a file without rows.
+GivenSample readInitialSample(std::string_view fileName, std::string_view text, const SearchSpace& space);
 
 /// readInitialSample() of a file.
-std::vector<ParameterSet> loadInitialSample(const std::string& fileName, const SearchSpace& space);
+GivenSample loadInitialSample(const std::string& fileName, const SearchSpace& space);
 
 }  // namespace mirevo

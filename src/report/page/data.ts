@@ -131,7 +131,9 @@ export interface Covariance {
   standardDeviation: Maybe[];
   lower95: Maybe[];
   upper95: Maybe[];
-  correlation: Maybe[][];
+  correlation: Maybe[][]; // empty where there are too many parameters to show it
+  largestCorrelations?: { first: string; second: string; value: Maybe }[]; // then these
+  correlationFile?: string; // which has all of them
   leftOut: string[];
 }
 

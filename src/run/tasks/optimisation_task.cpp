@@ -6,6 +6,7 @@
 
 #include <fmt/format.h>
 
+#include "common/fatal_error.h"
 #include "common/text.h"
 #include "run/access/file_validation.h"
 #include "run/tasks/infeasible_sets.h"
@@ -126,6 +127,7 @@ void OptimisationTask::read(const TaskReading& reading) {
   sample.read(initialSampleSection(), filled);
   if (initialSample.generation == SampleGeneration::fromFile) {
     validateFileOpens(initialSample.fileName, kInitialSampleFileKeyword, sample);
+    if (method->facts().drawsInitialSample) takeGivenValues(reading);
   } else if (!initialSample.fileName.empty()) {
     sample.warn(kInitialSampleFileKeyword, fmt::format("not read, as Initial_Sample_Generation is {} and not 4",
                                                        static_cast<int>(initialSample.generation)));
@@ -135,6 +137,27 @@ void OptimisationTask::read(const TaskReading& reading) {
   const SetupSection stops = section.open(nameInside(stoppingSection().row));
   readStopping(stops, reading.variableCount);
   if (surrogateUse == SurrogateUse::yes) readSurrogate(reading, section, stops);
+}
+
+/// The values of the sample file, which runs get exactly.
+void OptimisationTask::takeGivenValues(const TaskReading& reading) {
+  GivenSample sample;
+  try {
+    sample = loadInitialSample(initialSample.fileName, BuildSearchSpace(reading.parameters));
+  } catch (const FatalError&) {
+    return;  // refused later: bounds with the other parameters, the file when the search begins
+  }
+  std::size_t variable = 0;
+  for (const ModelParameter& parameter : reading.parameters) {
+    std::vector<double>& values = givenValues_.emplace_back();
+    if (parameter.parameterType != ParameterType::variable) continue;
+    for (const ParameterSet& set : sample.modelScale) values.push_back(set[variable]);
+    ++variable;
+  }
+}
+
+std::vector<double> OptimisationTask::givenValues(std::size_t parameter) const {
+  return parameter < givenValues_.size() ? givenValues_[parameter] : std::vector<double>{};
 }
 
 void OptimisationTask::readMethod(const TaskReading& reading, const SetupSection& section) const {
@@ -247,7 +270,7 @@ SearchSummary OptimisationTask::search(const TaskContext& context) const {
   SearchProblem problem{searchBounds(context.space), stopping, initialSample, {}, context.evaluator, random};
   problem.earlierSearches = earlierSearches_;
   if (method->facts().drawsInitialSample && initialSample.generation == SampleGeneration::fromFile) {
-    problem.givenSample = loadInitialSample(initialSample.fileName, context.space);
+    problem.givenSample = loadInitialSample(initialSample.fileName, context.space).sets;
   }
   problem.feasibility = context.feasibility;
   warnOfGivenSets(context, problem);

@@ -19,6 +19,7 @@ class OptimisationTask final : public Task {
   std::vector<std::string> neededSections(const SetupSection& target) const override;
   void read(const TaskReading& reading) override;
   bool mayHaveInitialSample() const override { return true; }
+  std::vector<double> givenValues(std::size_t parameter) const override;
   std::string description() const override;
   std::vector<std::string> summaryLines(const SearchSpace& space) const override;
   int plannedEvaluations(std::size_t /*variableCount*/) const override { return stopping.maxEvaluations; }
@@ -40,6 +41,7 @@ class OptimisationTask final : public Task {
  private:
   /// Whether a surrogate model assists the search.
   bool usesSurrogate() const { return surrogateUse == SurrogateUse::yes && method->facts().usesSurrogate; }
+  void takeGivenValues(const TaskReading& reading);
   void readMethod(const TaskReading& reading, const SetupSection& section) const;
   void readStopping(const SetupSection& section, std::size_t variableCount);
   void warnOfOneLoop(const SetupSection& section) const;
@@ -47,6 +49,7 @@ class OptimisationTask final : public Task {
   void warnOfGivenSets(const TaskContext& context, const SearchProblem& problem) const;
   SearchSummary search(const TaskContext& context) const;
 
+  std::vector<std::vector<double>> givenValues_;  ///< those of a sample file, one entry per model parameter
   std::vector<EarlierSearch> earlierSearches_;
 };
 

@@ -138,7 +138,9 @@ void addCovariance(const TaskContext& context, const ParameterSet& set, const Li
     return;
   }
   const ParameterCovariance covariance = parameterCovariance(*found.model);
-  for (std::string& line : formatCovariance(covariance, context.space, set)) outcome.report.push_back(std::move(line));
+  for (std::string& line : formatCovariance(covariance, context.space, set, context.filePrefix)) {
+    outcome.report.push_back(std::move(line));
+  }
   for (DataTable& table : covarianceTables(covariance, context.space, set)) outcome.tables.push_back(std::move(table));
   outcome.tables.push_back(jacobianTable(*found.model, context.space, found.labels));
 }

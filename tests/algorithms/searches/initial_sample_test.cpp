@@ -90,9 +90,10 @@ TEST(InitialSample, ReadsASampleOnTheModelScaleWithColumnsInAnyOrder) {
        {"# made by hand\n\nn layers k\n0.5 4 1\n 1\t1  0.1 \n", "n,layers,k\r\n0.5,4,1\r\n1,1,0.1",
         "n;layers; k\n0.5; 4; 1\n1;1;0.1\n", "n\tlayers\tk\n5D-1\t4\t1\n1\t1\t0.1\n"}) {
     const auto sample = readInitialSample("s.txt", text, kSpace);
-    ASSERT_EQ(sample.size(), 2U) << text;
-    EXPECT_THAT(sample[0], ElementsAre(DoubleEq(0.0), 4, 0.5)) << text;
-    EXPECT_THAT(sample[1], ElementsAre(std::log(0.1), 1, 1)) << text;
+    ASSERT_EQ(sample.sets.size(), 2U) << text;
+    EXPECT_THAT(sample.sets[0], ElementsAre(DoubleEq(0.0), 4, 0.5)) << text;
+    EXPECT_THAT(sample.sets[1], ElementsAre(std::log(0.1), 1, 1)) << text;
+    EXPECT_THAT(sample.modelScale, ElementsAre(ParameterSet{1, 4, 0.5}, ParameterSet{0.1, 1, 1})) << text;
   }
 }
 

@@ -83,6 +83,18 @@ function confidencePlan(data: ReportData, covariance: Covariance): ChartPlan {
   };
 }
 
+function correlationContent(covariance: Covariance): Node[] {
+  const note = 'Values near \u00b11 say that the observations cannot tell two parameters apart.';
+  const { names, correlation, largestCorrelations, correlationFile } = covariance;
+  if (!largestCorrelations) return [chart(heatmap('Correlation of the estimated parameters', names, names, correlation, 1, note))];
+  return [
+    heading('Largest correlations of the estimated parameters'),
+    paragraph(`${note} All of them are in ${correlationFile ?? ''}.`),
+    table([{ title: 'Parameter' }, { title: 'Parameter' }, { title: 'Correlation', number: true }],
+      largestCorrelations.map(({ first, second, value }) => [shorten(first, 80), shorten(second, 80), number(value)]), 'Largest correlations'),
+  ];
+}
+
 function covarianceContent(data: ReportData, covariance: Covariance): Node[] {
   const columns = [{ title: 'Parameter' }, { title: 'Estimate', number: true }, { title: 'Standard deviation', number: true },
     { title: 'Lower limit', number: true }, { title: 'Upper limit', number: true }, { title: 'Deviation / estimate', number: true }];
@@ -97,8 +109,7 @@ function covarianceContent(data: ReportData, covariance: Covariance): Node[] {
     table(columns, rows, 'Confidence limits'),
     ...(covariance.leftOut.length > 0 ? [paragraph(`Left out, as the outputs do not determine them: ${covariance.leftOut.map((name) => `\u2068${shorten(name, 60)}\u2069`).join(', ')}.`)] : []),
     chart(confidencePlan(data, covariance)),
-    chart(heatmap('Correlation of the estimated parameters', covariance.names, covariance.names, covariance.correlation, 1,
-      'Values near \u00b11 say that the observations cannot tell two parameters apart.')),
+    ...correlationContent(covariance),
   ];
 }
 
