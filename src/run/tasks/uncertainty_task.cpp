@@ -26,6 +26,10 @@ std::vector<std::string> reportBands(const TaskContext& context, std::span<const
                         : fmt::format("Band of {}: {:.1f} % of {} observations lie between the 5 and the 95 % quantile",
                                       name, 100.0 * band.shareInside, band.observationCount));
     lines.push_back("   " + files.back().path);
+    if (const std::string fewer = fewerRunsText(band); !fewer.empty()) {
+      lines.push_back("   " + fewer);
+      context.log.warning(fmt::format("Band of {}: {}", name, fewer));
+    }
   }
   return lines;
 }
