@@ -15,6 +15,11 @@ std::string rangeText(std::string_view what, const ValueSummary& range) {
   return fmt::format("{} {:.6g} to {:.6g}, mean {:.6g}", what, range.least, range.largest, range.mean);
 }
 
+/// "1 pair", "9 pairs"
+std::string countText(std::size_t count, std::string_view what) {
+  return fmt::format("{} {}{}", count, what, count == 1 ? "" : "s");
+}
+
 }  // namespace
 
 PairsFound InitialPairs::take(EvaluationResult& result) {
@@ -58,9 +63,10 @@ std::vector<std::string> InitialPairs::linesOfInitial() const {
   std::vector<std::string> lines{
       fmt::format("Pairs of simulated and observed values in evaluation No. {}, the initial run:", initialNumber_)};
   for (const MeasurePairs& pairs : initial_) {
-    lines.push_back(fmt::format("   {}: {} pairs, {} observations without a simulated value, {} to {}",
-                                trimTrailing(measureNames_.at(pairs.measure)), pairs.count, pairs.missingCount,
-                                formatDate(dateOfSecond(pairs.first)), formatDate(dateOfSecond(pairs.last))));
+    lines.push_back(fmt::format("   {}: {}, {} without a simulated value, {} to {}",
+                                trimTrailing(measureNames_.at(pairs.measure)), countText(pairs.count, "pair"),
+                                countText(pairs.missingCount, "observation"), formatDate(dateOfSecond(pairs.first)),
+                                formatDate(dateOfSecond(pairs.last))));
     lines.push_back(
         fmt::format("      {}; {}", rangeText("observed", pairs.observed), rangeText("simulated", pairs.simulated)));
   }
@@ -73,10 +79,10 @@ std::vector<FewerPairs> InitialPairs::findFewer(int number, std::span<const Meas
     const auto initial = std::find_if(initial_.begin(), initial_.end(),
                                       [&found](const MeasurePairs& other) { return other.measure == found.measure; });
     if (initial == initial_.end() || found.count >= initial->count) continue;
-    fewer.push_back(
-        {number, found.measure, found.count, initial->count,
-         fmt::format("output measure \"{}\" has {} pairs, {} in the initial run, No. {}",
-                     trimTrailing(measureNames_.at(found.measure)), found.count, initial->count, initialNumber_)});
+    fewer.push_back({number, found.measure, found.count, initial->count,
+                     fmt::format("output measure \"{}\" has {}, {} in the initial run, No. {}",
+                                 trimTrailing(measureNames_.at(found.measure)), countText(found.count, "pair"),
+                                 initial->count, initialNumber_)});
   }
   return fewer;
 }

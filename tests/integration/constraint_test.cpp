@@ -62,6 +62,7 @@ TEST(Constraints, TellOfASampleOfWhichTooManySetsViolateThemBeforeTheFirstRunAnd
             log.find("Evaluation of parameter set No. 1 "));
   EXPECT_THAT(log, AllOf(HasSubstr("\nfailed evaluations: 7, 7 of them not run as they violate a constraint or "
                                    "an equation has no finite value; at most"),
+                         HasSubstr("\n1 warning: the lines above that begin with \"Warning: \"\n"),
                          Not(HasSubstr("model run error")), Not(HasSubstr("failed model run"))));
   EXPECT_THAT(folder.read("calSimErr.dat"), HasSubstr(" (parameter constraints violated)\n"));
 

@@ -2,6 +2,8 @@
 
 #include <algorithm>
 #include <cmath>
+#include <set>
+#include <span>
 #include <utility>
 
 #include <fmt/format.h>
@@ -88,6 +90,18 @@ void logBestSet(const TaskContext& context, const ParameterSet& best, const Eval
   context.log.line(fmt::format("Aggregate: {}", formatReal(result.aggregate)));
 }
 
+void warnOffGrid(const ModelParameter& parameter, std::span<const double> values, const SetupSection& section) {
+  const auto isOff = [&parameter](double value) { return !isOnGrid(parameter, value); };
+  const auto first = std::find_if(values.begin(), values.end(), isOff);
+  if (first == values.end()) return;
+  section.warn(
+      kInitialSampleFileKeyword,
+      fmt::format("{} of the {} values of the integer parameter {} are not whole numbers of steps above "
+                  "Lower_Bound = {}; of the first, {}, {} is taken",
+                  std::count_if(first, values.end(), isOff), values.size(), quotedForMessage(parameter.name),
+                  formatReal(parameter.lowerBound), formatReal(*first), formatReal(onGrid(parameter, *first))));
+}
+
 }  // namespace
 
 const TaskFacts& OptimisationTask::facts() const {
@@ -127,7 +141,7 @@ void OptimisationTask::read(const TaskReading& reading) {
   sample.read(initialSampleSection(), filled);
   if (initialSample.generation == SampleGeneration::fromFile) {
     validateFileOpens(initialSample.fileName, kInitialSampleFileKeyword, sample);
-    if (method->facts().drawsInitialSample) takeGivenValues(reading);
+    if (method->facts().drawsInitialSample) takeGivenValues(reading, sample);
   } else if (!initialSample.fileName.empty()) {
     sample.warn(kInitialSampleFileKeyword, fmt::format("not read, as Initial_Sample_Generation is {} and not 4",
                                                        static_cast<int>(initialSample.generation)));
@@ -140,7 +154,7 @@ void OptimisationTask::read(const TaskReading& reading) {
 }
 
 /// The values of the sample file, which runs get exactly.
-void OptimisationTask::takeGivenValues(const TaskReading& reading) {
+void OptimisationTask::takeGivenValues(const TaskReading& reading, const SetupSection& section) {
   GivenSample sample;
   try {
     sample = loadInitialSample(initialSample.fileName, BuildSearchSpace(reading.parameters));
@@ -153,7 +167,16 @@ void OptimisationTask::takeGivenValues(const TaskReading& reading) {
     if (parameter.parameterType != ParameterType::variable) continue;
     for (const ParameterSet& set : sample.modelScale) values.push_back(set[variable]);
     ++variable;
+    warnOffGrid(parameter, values, section);
   }
+  const std::size_t distinct = std::set<ParameterSet>(sample.sets.begin(), sample.sets.end()).size();
+  if (distinct == sample.sets.size()) return;
+  section.warn(kInitialSampleFileKeyword,
+               distinct == 1
+                   ? fmt::format("its {} sets are the same: a search proposes nothing else among equal points",
+                                 sample.sets.size())
+                   : fmt::format("{} of its {} sets are repetitions of others", sample.sets.size() - distinct,
+                                 sample.sets.size()));
 }
 
 std::vector<double> OptimisationTask::givenValues(std::size_t parameter) const {
