@@ -71,13 +71,16 @@ std::optional<std::int32_t> rowsOfBand(std::string_view text) {
   return std::nullopt;
 }
 
-/// Empty where there is none; `fault` tells of a file that is damaged.
+/// Empty, with the fault, where there is none or it cannot be read; a damaged one has a fault, too.
 std::optional<ReportedBand> readBand(const std::string& path, std::string& fault) {
   constexpr int kItems = 4;
   std::string reason;
   const auto file = createTimeSeriesObject(path, reason);
   std::error_code ignored;
-  if (!std::filesystem::exists(path, ignored)) return std::nullopt;
+  if (!std::filesystem::exists(path, ignored)) {
+    fault = fmt::format("{} is not there, and its band is not shown", fileNameOf(path));
+    return std::nullopt;
+  }
   const std::string text = readTextFile(path, reason).value_or(std::string());
   bool isRead = file && file->open(path) && file->itemCount() == kItems && file->startTime();
   for (int item = 1; isRead && item <= kItems; ++item) isRead = file->getData(item);
@@ -174,23 +177,27 @@ std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, 
   return reported;
 }
 
-void takeObservationComposites(const std::string& filePrefix, ReportedSensitivity& sensitivity) {
+std::string takeObservationComposites(const std::string& filePrefix, ReportedSensitivity& sensitivity) {
+  const std::string path = runFilePath(filePrefix, run_files::kSensitivities);
+  const std::string damaged = fileNameOf(path) + " is cut off or damaged";
   std::string fault;
-  const ReadTable table = readTable(runFilePath(filePrefix, run_files::kSensitivities), fault);
+  const ReadTable table = readTable(path, fault);
+  if (!fault.empty()) return fault;
   const auto kind = table.column("Kind");
   const auto composite = table.column("Composite");
-  if (!kind || !composite) return;
+  if (!kind || !composite) return damaged;
   std::vector<double> found;
   for (const std::vector<std::string>& cells : table.rows) {
     if (cells[*kind] != "observations" || found.size() == sensitivity.parameters.size()) continue;
-    if (cells.front() != sensitivity.parameters[found.size()]) return;
+    if (cells.front() != sensitivity.parameters[found.size()]) return damaged;
     found.push_back(realCell(cells[*composite]).value_or(std::numeric_limits<double>::quiet_NaN()));
   }
-  if (found.empty() || found.size() != sensitivity.parameters.size()) return;
+  if (found.empty() || found.size() != sensitivity.parameters.size()) return damaged;
   sensitivity.composite = std::move(found);
   sensitivity.isOfObservations = true;
   sensitivity.ranking.clear();
   for (const std::size_t i : ranked(sensitivity.composite)) sensitivity.ranking.push_back(sensitivity.parameters[i]);
+  return "";
 }
 
 std::optional<ReportedCovariance> reportedCovariance(const std::string& filePrefix, std::string& fault) {

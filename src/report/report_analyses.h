@@ -19,7 +19,7 @@ namespace mirevo {
 std::string pairName(std::span<const OutputMeasure> measures, std::size_t measure);
 
 /// The bands that an uncertainty analysis has written beside its results, one per pair of series; those that cannot be
-/// read are left out. `faults` gets a text on each that is damaged.
+/// read are left out. `faults` gets a text on each that is damaged or not there.
 std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::string& filePrefix,
                                         std::vector<std::string>& faults);
 
@@ -27,9 +27,9 @@ std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::stri
 std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, const SensitivitySettings& settings,
                                                        const SearchSpace& space, std::span<const ResultRow> rows);
 
-/// Takes the composites over the observations, and the ranking by them, from the tables of a finished analysis, if it
-/// has written any.
-void takeObservationComposites(const std::string& filePrefix, ReportedSensitivity& sensitivity);
+/// Takes the composites over the observations, and the ranking by them, from the table of a finished analysis. Returns
+/// why it cannot; empty if it can.
+std::string takeObservationComposites(const std::string& filePrefix, ReportedSensitivity& sensitivity);
 
 /// The covariance of the parameters that a finished sensitivity analysis has written beside its results; empty if there
 /// is none, or if its files cannot be read, with the reason in `fault`.

@@ -570,8 +570,8 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
 /// afterwards goes to the user and the message file alone.
 void RunDriver::endLogInError(std::string_view message, std::string_view details) {
   const EndingSignalsHeld held;  // or a signal's message could come below
-  if (reporter_) logFailures();
   if (state_.log.warningCount() > 0) state_.log.line(whereWarningsAre());
+  if (reporter_) logFailures();
   if (!details.empty()) state_.log.line(fmt::format("\n{}", details));
   if (!hasBegun_) state_.log.markAsOfNoRun(isSetupRead_ ? "The run did not begin" : "The setup is refused");
   state_.log.line(fmt::format("\n{}", message));
