@@ -63,16 +63,9 @@ void appendColumns(std::vector<std::vector<double>>& rows, const std::vector<std
   for (std::size_t i = 0; i < more.size(); ++i) rows[i].insert(rows[i].end(), more[i].begin(), more[i].end());
 }
 
-/// How many rows the head of a band says that it has; nothing in those of earlier versions.
-std::optional<std::int32_t> rowsOfBand(std::string_view text) {
-  for (std::string_view line : splitLines(text.substr(0, text.find("\ntime")))) {
-    if (takeText(line, "# ") && takeText(line, kBandRows)) return parseInteger(trimTrailing(line));
-  }
-  return std::nullopt;
-}
-
-/// Empty, with the fault, where there is none or it cannot be read; a damaged one has a fault, too.
-std::optional<ReportedBand> readBand(const std::string& path, std::string& fault) {
+/// Empty, with the fault, where there is none or it cannot be read; a damaged one has a fault, too. `lines`: how many
+/// were written, if that is known.
+std::optional<ReportedBand> readBand(const std::string& path, std::optional<int> lines, std::string& fault) {
   constexpr int kItems = 4;
   std::string reason;
   const auto file = createTimeSeriesObject(path, reason);
@@ -84,14 +77,13 @@ std::optional<ReportedBand> readBand(const std::string& path, std::string& fault
   const std::string text = readTextFile(path, reason).value_or(std::string());
   bool isRead = file && file->open(path) && file->itemCount() == kItems && file->startTime();
   for (int item = 1; isRead && item <= kItems; ++item) isRead = file->getData(item);
-  const auto rows = rowsOfBand(text);
+  const auto wholeLines = std::count(text.begin(), text.end(), '\n');
   if (!isRead) {
-    if (rows != 0) fault = fileNameOf(path) + " is damaged and left out";
+    fault = fileNameOf(path) + " is damaged and left out";
     return std::nullopt;
   }
-  const std::int64_t wholeRows = std::ssize(file->times()) - (text.ends_with('\n') ? 0 : 1);
-  if (rows && wholeRows != *rows) {
-    fault = fmt::format("{} is cut off or damaged: {} of its {} rows are whole", fileNameOf(path), wholeRows, *rows);
+  if (lines && wholeLines != *lines) {
+    fault = fmt::format("{} is cut off or damaged: {} of its {} lines are whole", fileNameOf(path), wholeLines, *lines);
   }
   ReportedBand band;
   const std::int64_t origin = secondNumber(*file->startTime());
@@ -141,12 +133,13 @@ std::string pairName(std::span<const OutputMeasure> measures, std::size_t measur
   return name;
 }
 
-std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::string& filePrefix,
+std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::string& filePrefix, const RunRecord& record,
                                         std::vector<std::string>& faults) {
   std::vector<ReportedBand> bands;
   for (const std::size_t i : measuresOfDistinctPairs(config.measures)) {
+    const std::string path = runFilePath(filePrefix, run_files::kBand, static_cast<int>(i) + 1);
     std::string fault;
-    auto band = readBand(runFilePath(filePrefix, run_files::kBand, static_cast<int>(i) + 1), fault);
+    auto band = readBand(path, record.linesOf(fileNameOf(path)), fault);
     if (!fault.empty()) faults.push_back(fault);
     if (!band) continue;
     band->measure = pairName(config.measures, i);

@@ -19,8 +19,9 @@ namespace mirevo {
 std::string pairName(std::span<const OutputMeasure> measures, std::size_t measure);
 
 /// The bands that an uncertainty analysis has written beside its results, one per pair of series; those that cannot be
-/// read are left out. `faults` gets a text on each that is damaged or not there.
-std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::string& filePrefix,
+/// read are left out. `faults` gets a text on each that is damaged or not there; how long they were is in the record of
+/// the run.
+std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::string& filePrefix, const RunRecord& record,
                                         std::vector<std::string>& faults);
 
 /// The results of a local sensitivity analysis, computed from its rows; empty without a row for the initial values.

@@ -295,7 +295,7 @@ void ReportBuilder::addAnalyses() {
   const TaskReport task = config_.task->report();
   if (task.hasBands && hasAnalysis) {
     std::vector<std::string> faults;
-    data_.bands = reportedBands(config_, filePrefix_, faults);
+    data_.bands = reportedBands(config_, filePrefix_, sources_.record, faults);
     for (const std::string& fault : faults) note(fault + ".");
   }
   if (task.sensitivity != nullptr) {

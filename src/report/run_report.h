@@ -21,4 +21,7 @@ bool writeReport(const RunConfig& config, const std::string& filePrefix, std::st
 /// Whether the file is a report on a run of that task.
 bool isReportOf(const std::string& path, std::string_view task);
 
+/// Whether the file is a report on a run of that task.
+bool isReportOf(const std::string& path, std::string_view task);
+
 }  // namespace mirevo

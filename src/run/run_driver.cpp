@@ -315,10 +315,16 @@ void RunDriver::openSeries() {
       state_.log.warning(fmt::format("The series of the earlier run are not taken up: {}: {}", path, reason));
     }
     const SeriesTable table = readSeriesTable(earlier.value_or(std::string{}));
-    if (table.isOf(task) && !table.isCutOff()) {
+    if (table.isOf(task)) {
+      if (table.isCutOff()) {
+        state_.log.warning(fmt::format(
+            "{} is cut off or damaged: only {} of its {} rows are taken up, and the series of the earlier run "
+            "have no values at other times",
+            path, table.rowCount(), *table.rowsWritten));
+      }
       series_->resume(table);
     } else {
-      keepEarlierFile(path, state_.log);  // damaged, or of a run of another task in between
+      keepEarlierFile(path, state_.log);  // of a run of another task in between
     }
   }
   reporter_->recordSeries(*series_);
@@ -342,8 +348,16 @@ TaskContext RunDriver::taskContext() {
 TaskOutcome RunDriver::runTask() {
   if (!config_.task) return {std::string(kEndOfTask)};
   outcome_ = config_.task->run(taskContext());
-  for (const TaskFile& file : outcome_->files) writeBesideResults(file.path, file.content, state_.log);
+  writeFiles(outcome_->files);
   return *outcome_;
+}
+
+void RunDriver::writeFiles(std::span<const TaskFile> files) {
+  for (const TaskFile& file : files) {
+    writeBesideResults(file.path, file.content, state_.log);
+    const auto lines = std::count(file.content.begin(), file.content.end(), '\n');
+    results_->record().record().lines.emplace_back(fileNameOf(file.path), static_cast<int>(lines));
+  }
 }
 
 /// Marked as those of an unfinished run, unless the task itself had come to its end.
@@ -371,9 +385,7 @@ std::vector<std::string> RunDriver::keepStatistics() {
     const auto outcome = statisticsOfEarlyEnd();
     if (!outcome || outcome->report.empty()) return {};
     report = outcome->report;
-    if (!outcome_) {
-      for (const TaskFile& file : outcome->files) writeBesideResults(file.path, file.content, state_.log);
-    }
+    if (!outcome_) writeFiles(outcome->files);
     results_->writeTables(outcome->tables, state_.log);
     if (!outcome_) results_->record().record().analysed = reporter_->evaluationCount() - reporter_->failedCount();
   } catch (const FatalError& error) {

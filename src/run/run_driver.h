@@ -65,6 +65,7 @@ class RunDriver final {
   void openSeries();
   /// Runs the task, if there is one, and writes its files.
   TaskOutcome runTask();
+  void writeFiles(std::span<const TaskFile> files);
   TaskContext taskContext();
   /// At an early end: logs and writes the statistics of what succeeded, and returns their lines for the result file.
   /// Nothing that goes wrong here may hide why the run ended.

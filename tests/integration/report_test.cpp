@@ -179,7 +179,10 @@ TEST(Report, SaysWhatIsMissingInItsFilesAndIsNotMadeOfWhatIsNotThere) {
   EXPECT_EQ(makeReport(folder).exitCode, 0);
   EXPECT_THAT(reportData(folder),
               HasSubstr(R"("notes":["basin_Series.dat is cut off or damaged: 31 of its 365 rows can be read.",)"
-                        R"("basin_Band_1.csv is cut off or damaged: 364 of its 365 rows are whole."])"));
+                        R"("basin_Band_1.csv is cut off or damaged: 366 of its 367 lines are whole."])"));
+  folder.editSetup("Restart = 0", "Restart = 1");
+  ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0);
+  EXPECT_THAT(reportData(folder), HasSubstr("is cut off or damaged: only 31 of its 365 rows are taken up"));
   // What the setup says now is not what the results depend on.
   cutTo("basin_Series.dat", 0);
   std::filesystem::remove(folder / "basin_Band_1.csv");

@@ -64,7 +64,7 @@ std::string fewerRunsText(const SeriesBand& band) {
 
 std::string seriesBandText(std::string_view title, const ObservedSeries& observed, const SeriesBand& band) {
   constexpr double kSecondsPerDay = 86400.0;
-  std::string text = fmt::format("# Band of {}\n# {}{}\n", columnName(title), kBandRows, observed.days.size());
+  std::string text = fmt::format("# Band of {}\n", columnName(title));
   if (const std::string fewer = fewerRunsText(band); !fewer.empty()) text += fmt::format("# {}\n", fewer);
   text += "time,observed,5 %,50 %,95 %\n";
   const std::int64_t origin = secondNumber(observed.start);

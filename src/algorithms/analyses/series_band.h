@@ -27,8 +27,6 @@ struct SeriesBand {
 /// evaluation's simulated values; `observed` holds its observations. Values that are not finite are left out.
 SeriesBand seriesBand(std::span<const double> observed, std::span<const EvaluationResult> results, std::size_t first);
 
-/// What stands before the number of rows in the head of the file.
-inline constexpr std::string_view kBandRows = "Rows: ";
 /// "its quantiles are of 3 to 20 runs ..."; empty where all are of equally many.
 std::string fewerRunsText(const SeriesBand& band);
 /// The band as a time-series file: the columns time, observed, 5 %, 50 % and 95 %, one row per observation.

@@ -39,6 +39,7 @@ constexpr std::string_view kAnalysed = "analysedEvaluations";
 constexpr std::string_view kFailedBy = "failed.";
 constexpr std::string_view kSigma = "sigma.";
 constexpr std::string_view kMu = "mu.";
+constexpr std::string_view kLines = "lines.";  ///< with the name of the file behind it
 constexpr std::string_view kEnded = "ended";
 constexpr std::string_view kState = "state";
 constexpr std::string_view kMessage = "message";
@@ -99,12 +100,18 @@ void takeRow(const std::string& name, const std::string& value, RunRecord& recor
   if (auto kind = nameBehind(key::kFailedBy, name)) record.failuresByKind.emplace_back(*kind, number().value_or(0));
   if (auto objective = nameBehind(key::kSigma, name)) scaleOf(record, *objective).sigma = real();
   if (auto objective = nameBehind(key::kMu, name)) scaleOf(record, *objective).mu = real();
+  if (auto file = nameBehind(key::kLines, name)) record.lines.emplace_back(*file, number().value_or(0));
   if (name == key::kEnded) record.ended = value;
   if (name == key::kState) record.stage = stageOfKey(value);
   if (name == key::kMessage) record.message = value;
 }
 
 }  // namespace
+
+std::optional<int> RunRecord::linesOf(std::string_view file) const {
+  const auto found = std::find_if(lines.begin(), lines.end(), [file](const auto& one) { return one.first == file; });
+  return found == lines.end() ? std::nullopt : std::optional(found->second);
+}
 
 std::string_view runStageKey(RunStage stage) {
   return kStageKeys.at(static_cast<std::size_t>(stage));
@@ -134,6 +141,7 @@ std::string runRecordText(const RunRecord& record, const std::vector<std::string
       rows.add(joined(key::kSigma, scale.objective), scale.sigma);
       rows.add(joined(key::kMu, scale.objective), scale.mu);
     }
+    for (const auto& [file, count] : record.lines) rows.addCount(joined(key::kLines, file), count);
     rows.addText(key::kEnded, record.ended);
     rows.addText(key::kState, runStageKey(*record.stage));
     rows.addText(key::kMessage, record.message);

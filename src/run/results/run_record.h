@@ -46,6 +46,10 @@ struct RunRecord {
   };
   std::vector<Scale> scales;
 
+  /// How many lines the files of an analysis have, by their names: those that are no tables.
+  std::vector<std::pair<std::string, int>> lines;
+  std::optional<int> linesOf(std::string_view file) const;
+
   std::string ended;  ///< nothing where a signal ended the run
   /// Nothing while the run goes on, or where it was killed.
   std::optional<RunStage> stage;
