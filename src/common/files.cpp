@@ -97,8 +97,9 @@ bool writeByUnlinkAndCreate(const std::string& path, std::string_view content, u
   return createAnew(path, content, mode, false, reason);
 }
 
-bool replaceFile(const std::string& path, std::string_view content, std::string& reason) {
-  const std::string temporary = path + std::string(kTemporaryEnding);
+bool replaceFile(const std::string& path, std::string_view content, std::string& reason,
+                 std::string_view temporaryEnding) {
+  const std::string temporary = path + std::string(temporaryEnding);
   struct stat status {};
   std::optional<unsigned> mode;
   if (::stat(path.c_str(), &status) == 0) mode = status.st_mode;

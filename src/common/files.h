@@ -34,6 +34,8 @@ inline constexpr std::string_view kTemporaryEnding = ".tmp";
 /// Replaces or creates a file: `content` is written to a temporary file beside it, flushed to disk and renamed, so that
 /// at every moment either the old or the new file is there, whole. The old file's mode is kept. False, with the
 /// system's reason, when that fails; the old file is then untouched.
-bool replaceFile(const std::string& path, std::string_view content, std::string& reason);
+/// Programs that may replace the same file at once give each a temporary name with an ending of its own.
+bool replaceFile(const std::string& path, std::string_view content, std::string& reason,
+                 std::string_view temporaryEnding = kTemporaryEnding);
 
 }  // namespace mirevo

@@ -12,7 +12,10 @@ void FailedRunPolicy::countFailure(int number, const EvaluationFailure& failure)
   if (failure.isOfConstraints()) ++notRunCount_;
   if (failedCount_ <= limit_) return;
   const std::string notRun =
-      notRunCount_ == 0 ? "" : fmt::format(", {} of them not run as they violate the constraints", notRunCount_);
+      notRunCount_ == 0
+          ? ""
+          : fmt::format(", {} of them not run as they violate a constraint or an equation has no finite value",
+                        notRunCount_);
   std::string detail = fmt::format(
       "failed evaluations: {}{}; at most {} may fail, a tenth of the {} planned\nthe last of them, No. {}: {}",
       failedCount_, notRun, limit_, planned_, number, failure.reason);

@@ -26,7 +26,7 @@ class FailedRunPolicy final {
   int limit_;
   int foldersLeft_;
   int failedCount_ = 0;
-  int notRunCount_ = 0;  ///< of them, those whose parameter set violates a constraint
+  int notRunCount_ = 0;  ///< of them, those whose parameter set cannot be run
 };
 
 }  // namespace mirevo

@@ -263,6 +263,21 @@ EvaluationResult ModelRunner::collect(int slot) {
   return result;
 }
 
+std::optional<std::int64_t> ModelRunner::observationLeftOut(std::size_t measure) {
+  constexpr std::int64_t kSecondsOfDay = 86400;
+  EvaluationPeriod rest{description_.period.end, description_.period.end};
+  const std::int64_t end = secondNumber(rest.start);
+  if (end % kSecondsOfDay != 0) return std::nullopt;
+  rest.end = dateOfSecond(end + kSecondsOfDay - 1);
+  const PeriodSeries series =
+      readPeriodSeries(series_.observation(measure), description_.measures[measure].observation, rest);
+  for (std::size_t i = 0; i < series.seconds.size(); ++i) {
+    const bool isOfDay = series.seconds[i] > end && series.seconds[i] < end + kSecondsOfDay;
+    if (isOfDay && !std::isnan(series.values[i])) return series.seconds[i];
+  }
+  return std::nullopt;
+}
+
 std::vector<PeriodSeries> ModelRunner::readShownObservations() {
   std::vector<PeriodSeries> observations;
   for (const std::size_t i : shownMeasures_) {

@@ -79,6 +79,9 @@ class ModelRunner final {
   const std::vector<ObservedSeries>& observedSeries() const { return observedSeries_; }
   /// The measures whose simulated series a result may hold, 0-based: one per pair of series that is compared.
   const std::vector<std::size_t>& shownMeasures() const { return shownMeasures_; }
+  /// The first observation, of the series of a measure, behind the end of the period on the same day if that end is the
+  /// beginning of the day; its secondNumber().
+  std::optional<std::int64_t> observationLeftOut(std::size_t measure);
   /// The observed series of each of shownMeasures().
   std::vector<PeriodSeries> readShownObservations();
   const std::vector<ParameterTemplate>& templates() const { return templates_; }

@@ -15,6 +15,11 @@ std::string rangeText(std::string_view what, const ValueSummary& range) {
   return fmt::format("{} {:.6g} to {:.6g}, mean {:.6g}", what, range.least, range.largest, range.mean);
 }
 
+/// "1 pair", "9 pairs"
+std::string countText(std::size_t count, std::string_view what) {
+  return fmt::format("{} {}{}", count, what, count == 1 ? "" : "s");
+}
+
 }  // namespace
 
 PairsFound PairComparison::take(EvaluationResult& result) {
@@ -59,9 +64,10 @@ std::vector<std::string> PairComparison::linesOfFirst() const {
   std::vector<std::string> lines{fmt::format(
       "Pairs of simulated and observed values in evaluation No. {}, the first successful run:", firstNumber_)};
   for (const MeasurePairs& pairs : first_) {
-    lines.push_back(fmt::format("   {}: {} pairs, {} observations without a simulated value, {} to {}",
-                                trimTrailing(measureNames_.at(pairs.measure)), pairs.count, pairs.missingCount,
-                                formatDate(dateOfSecond(pairs.first)), formatDate(dateOfSecond(pairs.last))));
+    lines.push_back(fmt::format("   {}: {}, {} without a simulated value, {} to {}",
+                                trimTrailing(measureNames_.at(pairs.measure)), countText(pairs.count, "pair"),
+                                countText(pairs.missingCount, "observation"), formatDate(dateOfSecond(pairs.first)),
+                                formatDate(dateOfSecond(pairs.last))));
     lines.push_back(
         fmt::format("      {}; {}", rangeText("observed", pairs.observed), rangeText("simulated", pairs.simulated)));
   }
@@ -78,10 +84,10 @@ bool PairComparison::compare(int number, std::span<const MeasurePairs> pairs, Pa
     hasOthers = true;
     if (each.count >= first->count) continue;
     hasFewer = true;
-    found.fewer.push_back(
-        {number, each.measure, each.count, first->count,
-         fmt::format("output measure \"{}\" has {} pairs, {} in the first successful run, No. {}",
-                     trimTrailing(measureNames_.at(each.measure)), each.count, first->count, firstNumber_)});
+    found.fewer.push_back({number, each.measure, each.count, first->count,
+                           fmt::format("output measure \"{}\" has {}, {} in the first successful run, No. {}",
+                                       trimTrailing(measureNames_.at(each.measure)), countText(each.count, "pair"),
+                                       first->count, firstNumber_)});
   }
   if (hasOthers && !hasFewer) found.others.push_back(number);
   return hasOthers;

@@ -1,5 +1,6 @@
 #include "parameters/parameter_model.h"
 
+#include <algorithm>
 #include <cassert>
 #include <cmath>
 #include <optional>
@@ -53,6 +54,9 @@ class ParameterModel::Implementation {
   std::optional<ParameterFailure> assignDependentParameters();
   std::optional<ParameterFailure> checkConstraints() const;
   bool hasConstraints() const { return !constraints_.empty(); }
+  bool hasEquations() const {
+    return std::any_of(equations_.begin(), equations_.end(), [](const auto& equation) { return equation != nullptr; });
+  }
 
   const std::vector<ModelParameter> parameters_;
   const SearchSpace space_;
@@ -198,12 +202,15 @@ std::variant<std::span<const double>, ParameterFailure> ParameterModel::MapToMod
 }
 
 Feasibility ParameterModel::feasibility() {
-  if (!implementation_->hasConstraints()) return {};
-  return Feasibility([this](std::span<const double> set) -> std::optional<std::string> {
-    const auto mapped = MapToModelValues(set);
-    const auto* failure = std::get_if<ParameterFailure>(&mapped);
-    return failure == nullptr ? std::nullopt : std::optional(failure->detail);
-  });
+  const bool hasConstraints = implementation_->hasConstraints();
+  if (!hasConstraints && !implementation_->hasEquations()) return {};
+  return Feasibility(
+      [this](std::span<const double> set) -> std::optional<std::string> {
+        const auto mapped = MapToModelValues(set);
+        const auto* failure = std::get_if<ParameterFailure>(&mapped);
+        return failure == nullptr ? std::nullopt : std::optional(failure->detail);
+      },
+      hasConstraints);
 }
 
 }  // namespace mirevo

@@ -43,7 +43,7 @@ class ParameterModel final {
   std::variant<std::span<const double>, ParameterFailure> MapToModelValues(std::span<const double> set);
 
   /// Whether sets can be run, as MapToModelValues() says, whose last vector a test makes invalid; without a test if
-  /// there are no constraints. The model must outlive it.
+  /// there are neither constraints nor dependent parameters. The model must outlive it.
   Feasibility feasibility();
 
  private:

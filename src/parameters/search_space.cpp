@@ -70,6 +70,18 @@ double TransformParameterValue(double value, double lowerBound, TransformationTy
   return 0.0;
 }
 
+double onGrid(const ModelParameter& parameter, double value) {
+  if (parameter.transformationType != TransformationType::integer) return value;
+  bool failed = false;
+  return TransformParameterValue(value, parameter.lowerBound, TransformationType::integer, TransformDirection::forward,
+                                 failed);
+}
+
+bool isOnGrid(const ModelParameter& parameter, double value) {
+  constexpr double kRounding = 1.0e-6;
+  return std::abs(onGrid(parameter, value) - value) <= kRounding;
+}
+
 SearchSpace BuildSearchSpace(std::span<const ModelParameter> parameters) {
   SearchSpace space;
   for (const ModelParameter& parameter : parameters) {

@@ -19,6 +19,11 @@ enum class TransformDirection : std::int32_t { forward = 0, backward = 1 };
 double TransformParameterValue(double value, double lowerBound, TransformationType type, TransformDirection direction,
                                bool& failed);
 
+/// The value that a run gets for one on the model scale: of an integer parameter that on its grid, else the same.
+double onGrid(const ModelParameter& parameter, double value);
+/// Whether it is the same but for rounding.
+bool isOnGrid(const ModelParameter& parameter, double value);
+
 /// The variable parameters on the search scale, in setup order; every vector has one entry per variable parameter.
 struct SearchSpace {
   std::vector<std::string> names;

@@ -52,20 +52,30 @@ std::size_t findParameter(std::string_view asWritten, std::span<const ModelParam
   return static_cast<std::size_t>(found - parameters.begin());
 }
 
+std::string withVisibleTabs(std::string_view text) {
+  std::string shown;
+  for (const char c : text) shown += c == '\t' ? std::string("\\t") : std::string(1, c);
+  return shown;
+}
+
 [[noreturn]] void failUnknownName(std::string_view templateName, int lineNumber, std::size_t column, bool paired,
                                   char delimiter, std::string_view name, std::span<const ModelParameter> parameters) {
   std::string detail = fmt::format("{}:{}:{}: ", templateName, lineNumber, column + 1);
   if (!paired) {
     detail += fmt::format("the delimiter {} has no partner in its line", delimiter);
   } else {
-    detail +=
-        fmt::format("no parameter has the name {}, which is between two {} here", quotedForMessage(name), delimiter);
+    detail += fmt::format("no parameter has the name {}, which is between two {} here",
+                          quotedForMessage(withVisibleTabs(name)), delimiter);
     std::vector<std::string> names;
     for (const ModelParameter& parameter : parameters) names.emplace_back(trimTrailing(parameter.name));
+    if (name.find('\t') != std::string_view::npos) {
+      detail += "\nIt has a tab, written as \\t in the message: only blanks around a name are left out";
+    }
     if (const auto nearest = nearestName(name, names)) detail += fmt::format("\ndid you mean \"{}\"?", *nearest);
   }
   // The fixed text has the name twice.
-  fatalError(fmt::format("Error: Parameter name {} in template file {} invalid", name, name), detail);
+  const std::string shown = withVisibleTabs(name);
+  fatalError(fmt::format("Error: Parameter name {} in template file {} invalid", shown, shown), detail);
 }
 
 void trimBlanksAtEnd(std::string& text) {

@@ -10,11 +10,13 @@
 #include <fmt/core.h>
 
 #include "algorithms/analyses/local_sensitivity.h"
+#include "algorithms/analyses/series_band.h"
 #include "common/calendar.h"
 #include "common/data_table.h"
 #include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/run_files.h"
+#include "common/take_text.h"
 #include "common/text.h"
 #include "evaluation/stored_results.h"
 #include "measures/period_series.h"
@@ -65,14 +67,17 @@ void appendColumns(std::vector<std::vector<double>>& rows, const std::vector<std
   for (std::size_t i = 0; i < more.size(); ++i) rows[i].insert(rows[i].end(), more[i].begin(), more[i].end());
 }
 
-/// Empty where there is none; `fault` tells of a file that is damaged. `lines`: how many were written, if that is
-/// known.
+/// Empty, with the fault, where there is none or it cannot be read; a damaged one has a fault, too. `lines`: how many
+/// were written, if that is known.
 std::optional<ReportedBand> readBand(const std::string& path, std::optional<int> lines, std::string& fault) {
   constexpr int kItems = 4;
   std::string reason;
   const auto file = createTimeSeriesObject(path, reason);
   std::error_code ignored;
-  if (!std::filesystem::exists(path, ignored)) return std::nullopt;
+  if (!std::filesystem::exists(path, ignored)) {
+    fault = fmt::format("{} is not there, and its band is not shown", fileNameOf(path));
+    return std::nullopt;
+  }
   const std::string text = readTextFile(path, reason).value_or(std::string());
   bool isRead = file && file->open(path) && file->itemCount() == kItems && file->startTime();
   for (int item = 1; isRead && item <= kItems; ++item) isRead = file->getData(item);
@@ -171,15 +176,18 @@ std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, 
   return reported;
 }
 
-void takeSensitivities(const std::string& filePrefix, ReportedSensitivity& sensitivity) {
+std::string takeSensitivities(const std::string& filePrefix, ReportedSensitivity& sensitivity) {
+  const std::string path = runFilePath(filePrefix, run_files::kSensitivities);
+  const std::string damaged = fileNameOf(path) + " is cut off or damaged";
   std::string fault;
-  const ReadTable table = readTable(runFilePath(filePrefix, run_files::kSensitivities), fault);
+  const ReadTable table = readTable(path, fault);
+  if (!fault.empty()) return fault;
   const auto kind = table.column("Kind");
   const auto output = table.column("Output");
   const auto derivative = table.column("Derivative");
   const auto scaled = table.column("Scaled");
   const auto composite = table.column("Composite");
-  if (!kind || !output || !derivative || !scaled || !composite) return;
+  if (!kind || !output || !derivative || !scaled || !composite) return damaged;
   ReportedSensitivity found;
   found.parameters = sensitivity.parameters;
   found.outputs = sensitivity.outputs;
@@ -198,15 +206,18 @@ void takeSensitivities(const std::string& filePrefix, ReportedSensitivity& sensi
         found.isOfObservations = true;
         continue;
       }
-      if (derivatives.size() == found.outputs.size() || (*row)[*output] != found.outputs[derivatives.size()]) return;
+      if (derivatives.size() == found.outputs.size() || (*row)[*output] != found.outputs[derivatives.size()]) {
+        return damaged;
+      }
       derivatives.push_back(number(*derivative));
       dimensionless.push_back(number(*scaled));
     }
-    if (derivatives.size() != found.outputs.size()) return;
+    if (derivatives.size() != found.outputs.size()) return damaged;
   }
-  if (row != table.rows.end()) return;
+  if (row != table.rows.end()) return damaged;
   for (const std::size_t i : ranked(found.composite)) found.ranking.push_back(found.parameters[i]);
   sensitivity = std::move(found);
+  return {};
 }
 
 std::optional<ReportedCovariance> reportedCovariance(const std::string& filePrefix, std::string& fault) {

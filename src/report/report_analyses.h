@@ -20,7 +20,8 @@ namespace mirevo {
 std::string pairName(std::span<const OutputMeasure> measures, std::size_t measure);
 
 /// The bands that an uncertainty analysis has written beside its results, one per pair of series; those that cannot be
-/// read are left out. `faults` gets a text on each that is damaged; how long they were is in the record of the run.
+/// read are left out. `faults` gets a text on each that is damaged or not there; how long they were is in the record of
+/// the run.
 std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::string& filePrefix, const RunRecord& record,
                                         std::vector<std::string>& faults);
 
@@ -30,9 +31,9 @@ std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, 
                                                        const SearchSpace& space, std::span<const ResultRow> rows,
                                                        const PairsByNumber& pairs);
 
-/// Takes the derivatives, which are of 64 bits, and the ranking from the table of a finished analysis, if it has
-/// written one.
-void takeSensitivities(const std::string& filePrefix, ReportedSensitivity& sensitivity);
+/// Takes the derivatives, which are of 64 bits, and the ranking from the table of a finished analysis. Returns why it
+/// cannot; empty if it can.
+std::string takeSensitivities(const std::string& filePrefix, ReportedSensitivity& sensitivity);
 
 /// The covariance of the parameters that a finished sensitivity analysis has written beside its results; empty if there
 /// is none, or if its files cannot be read, with the reason in `fault`.

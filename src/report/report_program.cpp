@@ -1,11 +1,14 @@
 #include "report/report_program.h"
 
 #include <exception>
+#include <string>
 #include <string_view>
+#include <unistd.h>
 
 #include <fmt/core.h>
 
 #include "common/fatal_error.h"
+#include "common/files.h"
 #include "common/run_files.h"
 #include "common/version.h"
 #include "platform/terminal/front_end.h"
@@ -30,7 +33,9 @@ int makeReport(const std::string& setupFileName) {
   const RunConfig config = readSetupFile(setupFileName, unread);
   const std::string filePrefix = config.setupFolder + "/" + config.setupName;
   std::string reason;
-  if (!writeReport(config, filePrefix, reason)) {
+  // The run may be making its report, and others this one.
+  const std::string temporaryEnding = fmt::format(".{}{}", ::getpid(), kTemporaryEnding);
+  if (!writeReport(config, filePrefix, reason, temporaryEnding)) {
     showMessage("Error: Unable to write the report of " + setupFileName + "\n" + reason);
     return 1;
   }

@@ -26,6 +26,7 @@
 #include "report/report_file.h"
 #include "report/report_parameters.h"
 #include "report/run_sources.h"
+#include "run/results/restart_settings.h"
 #include "run/results/shared_files.h"
 #include "run/setup/setup_summary.h"
 
@@ -51,6 +52,7 @@ class ReportBuilder final {
 
  private:
   void addRun();
+  void noteChangedSetup();
   void addEvaluations();
   void findBestAndInitial();
   void addMeasures();
@@ -98,6 +100,7 @@ ReportData ReportBuilder::build() {
     note(fmt::format("{} of the result file {} cut off or damaged and left out.",
                      isOne ? "1 line" : fmt::format("{} lines", table.unusableLines), isOne ? "is" : "are"));
   }
+  noteChangedSetup();
   if (!table.hasExpectedColumns) {
     if (table.hasHeader) note("The results are left out: they have other columns than the setup as it is now.");
     table.rows.clear();
@@ -145,6 +148,23 @@ void ReportBuilder::addRun() {
   run.algorithm = task.algorithm;
   run.populationSize = task.populationSize;
   run.surrogate = task.surrogate;
+}
+
+/// Bounds, period and all else that the setup says are those of the setup as it is now.
+void ReportBuilder::noteChangedSetup() {
+  constexpr std::size_t kMostChanges = 5;
+  const auto source = readSettings(filePrefix_, config_.task->facts().resultFiles);
+  if (!source.content) {
+    if (!source.reason.empty())
+      note(fmt::format("Whether the setup was changed since is not known: {}.", source.reason));
+    return;
+  }
+  const std::vector<std::string> changes = changedSettings(*source.content, restartSettings(config_));
+  if (changes.empty()) return;
+  std::string text;
+  for (std::size_t i = 0; i < std::min(changes.size(), kMostChanges); ++i) text += (i == 0 ? "" : "; ") + changes[i];
+  if (changes.size() > kMostChanges) text += fmt::format("; and {} more", changes.size() - kMostChanges);
+  note(fmt::format("The setup was changed since: {}. The report has what the setup says now.", text));
 }
 
 void ReportBuilder::addEvaluations() {
@@ -305,8 +325,11 @@ void ReportBuilder::addAnalyses() {
                      config_.plannedEvaluations()));
   }
   if (!data_.sensitivity || !hasAnalysis) return;
-  takeSensitivities(filePrefix_, *data_.sensitivity);
-  std::string fault;
+  std::string fault = takeSensitivities(filePrefix_, *data_.sensitivity);
+  if (!fault.empty()) {
+    note(fmt::format("The derivatives, and the ranking by them, are computed again from the result file: {}.", fault));
+  }
+  fault.clear();
   data_.sensitivity->covariance = reportedCovariance(filePrefix_, fault);
   if (!fault.empty()) note(fmt::format("The covariance is not shown: {}.", fault));
 }
@@ -319,7 +342,8 @@ std::optional<ReportData> buildReport(const RunConfig& config, const std::string
   return builder.build();
 }
 
-bool writeReport(const RunConfig& config, const std::string& filePrefix, std::string& reason) noexcept {
+bool writeReport(const RunConfig& config, const std::string& filePrefix, std::string& reason,
+                 std::string_view temporaryEnding) noexcept {
   try {
     if (reportPageTemplate().empty()) {
       reason = "this build has no report page (it was configured with MIREVO_REPORT_PAGE=OFF)";
@@ -329,7 +353,8 @@ bool writeReport(const RunConfig& config, const std::string& filePrefix, std::st
     if (!data) return false;
     const std::string path = runFilePath(filePrefix, run_files::kReport);
     reason = whyNotReplaceable(path, run_files::kReport);
-    if (reason.empty() && replaceFile(path, reportPage(reportPageTemplate(), *data), reason)) return true;
+    if (reason.empty() && replaceFile(path, reportPage(reportPageTemplate(), *data), reason, temporaryEnding))
+      return true;
     reason = path + ": " + reason;
   } catch (const FatalError& error) {
     reason = error.message() + "\n" + error.detail();

@@ -4,6 +4,7 @@
 #include <string>
 #include <string_view>
 
+#include "common/files.h"
 #include "report/report_data.h"
 #include "run/setup/run_config.h"
 
@@ -14,7 +15,11 @@ namespace mirevo {
 std::optional<ReportData> buildReport(const RunConfig& config, const std::string& filePrefix, std::string& reason);
 
 /// Builds the report and writes it to its path. False, with the reason, when that fails; never throws.
-bool writeReport(const RunConfig& config, const std::string& filePrefix, std::string& reason) noexcept;
+bool writeReport(const RunConfig& config, const std::string& filePrefix, std::string& reason,
+                 std::string_view temporaryEnding = kTemporaryEnding) noexcept;
+
+/// Whether the file is a report on a run of that task.
+bool isReportOf(const std::string& path, std::string_view task);
 
 /// Whether the file is a report on a run of that task.
 bool isReportOf(const std::string& path, std::string_view task, std::string& reason);

@@ -115,6 +115,20 @@ OptionalSource<PairsByNumber> readPairs(const std::string& filePrefix, const Res
   return readSource<PairsByNumber>(runFilePath(filePrefix, names.pairs), readPairsTable);
 }
 
+OptionalSource<RestartSettings> readSettings(const std::string& filePrefix, const ResultFileNames& names) {
+  const std::string path = runFilePath(filePrefix, names.restart);
+  OptionalSource<RestartSettings> source{{}, fileNameOf(path), {}};
+  std::error_code ignored;
+  if (!std::filesystem::exists(path, ignored)) return source;
+  std::string reason;
+  if (const auto text = readTextFile(path, reason)) {
+    source.content = parseRestartSettings(*text);
+    reason = "it is cut off or damaged";
+  }
+  if (!source.content) source.reason = fmt::format("{}: {}", source.file, reason);
+  return source;
+}
+
 OptionalSource<SeriesTable> readSeries(const std::string& filePrefix) {
   return readSource<SeriesTable>(runFilePath(filePrefix, run_files::kSeries), readSeriesTable);
 }

@@ -7,6 +7,7 @@
 #include "parameters/search_space.h"
 #include "run/results/failure_table.h"
 #include "run/results/pairs_file.h"
+#include "run/results/restart_settings.h"
 #include "run/results/result_table.h"
 #include "run/results/run_record.h"
 #include "run/results/series_table.h"
@@ -39,6 +40,8 @@ std::optional<RunSources> readRunSources(const RunConfig& config, const SearchSp
 
 OptionalSource<std::vector<FailureRow>> readFailures(const std::string& filePrefix, const ResultFileNames& names);
 OptionalSource<PairsByNumber> readPairs(const std::string& filePrefix, const ResultFileNames& names);
+/// The settings with which the results were computed; without a reason if an earlier version wrote none.
+OptionalSource<RestartSettings> readSettings(const std::string& filePrefix, const ResultFileNames& names);
 OptionalSource<SeriesTable> readSeries(const std::string& filePrefix);
 
 }  // namespace mirevo

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <array>
 #include <cerrno>
+#include <cmath>
 #include <cstring>
 #include <filesystem>
 #include <new>
@@ -260,6 +261,38 @@ void RunDriver::putEarlierReportAside() {
   }
 }
 
+/// An end without a time of day is the beginning of its day.
+void RunDriver::warnOfLastDay() {
+  for (const std::size_t i : runner_->shownMeasures()) {
+    const auto leftOut = runner_->observationLeftOut(i);
+    if (!leftOut) continue;
+    state_.log.warning(fmt::format(
+        "End_Date = {} is the beginning of its day: the later observations of that day are left out (output "
+        "measure {}, {} ...). With a time of day, such as 23:59, they count",
+        formatDate(config_.period.end), quotedForMessage(config_.measures[i].name),
+        formatDate(dateOfSecond(*leftOut))));
+  }
+}
+
+/// Empty for a task that keeps no simulated values.
+std::vector<KeptSeries> RunDriver::keptSeries() const {
+  constexpr double kSecondsPerDay = 86400.0;
+  const bool isExact = config_.task && config_.task->keptPrecision() == SeriesPrecision::exact;  // units follow
+  const std::vector<std::size_t>& shown = runner_->shownMeasures();
+  std::vector<KeptSeries> kept;
+  std::size_t first = 0;
+  for (const ObservedSeries& observed : runner_->observedSeries()) {
+    if (std::find(shown.begin(), shown.end(), observed.measure) != shown.end()) {
+      KeptSeries& series = kept.emplace_back();
+      series.first = first;
+      const std::int64_t origin = secondNumber(observed.start);
+      for (const double days : observed.days) series.seconds.push_back(origin + std::llround(days * kSecondsPerDay));
+    }
+    first += observed.values.size() * (isExact ? 2 : 1);
+  }
+  return kept;
+}
+
 void RunDriver::openSeries() {
   const std::string path = runFilePath(filePrefix_, run_files::kSeries);
   const bool goesOn = results_->earlierEvaluations() != nullptr;
@@ -275,7 +308,9 @@ void RunDriver::openSeries() {
   run.observations = runner_->readShownObservations();
   run.periodFirst = secondNumber(config_.period.start);
   run.periodLast = secondNumber(config_.period.end);
+  warnOfLastDay();
   run.initialValues = ToModelScale(parameters_->searchSpace(), parameters_->searchSpace().initial);
+  run.kept = keptSeries();
   series_ = std::make_unique<SeriesRecorder>(path, std::move(run), runTimeClock,
                                              [this](std::string_view text) { state_.log.warning(text); });
   if (goesOn) {
@@ -459,7 +494,7 @@ void RunDriver::finish(const TaskOutcome& outcome) {
   }
   logFailures();
   if (state_.log.warningCount() > 0) {
-    state_.log.line(warningCountText() + ": the lines above that begin with \"Warning: \"");
+    state_.log.line(whereWarningsAre());
   }
   state_.log.line("");
   state_.log.line(kNormalTermination);
@@ -483,6 +518,10 @@ void RunDriver::finish(const TaskOutcome& outcome) {
 std::string RunDriver::warningCountText() const {
   const int count = state_.log.warningCount();
   return count == 1 ? std::string("1 warning") : fmt::format("{} warnings", count);
+}
+
+std::string RunDriver::whereWarningsAre() const {
+  return warningCountText() + ": the lines above that begin with \"Warning: \"";
 }
 
 /// Says on standard error how many warnings there are and where.
@@ -552,6 +591,7 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
 /// What explains the message stands above it.
 void RunDriver::endLogInError(std::string_view message, std::string_view details) {
   const EndingSignalsHeld held;  // or a signal's message could come below
+  if (state_.log.warningCount() > 0) state_.log.line(whereWarningsAre());
   if (reporter_) logFailures();
   if (!details.empty()) state_.log.line(fmt::format("\n{}", details));
   if (!hasBegun_) state_.log.markAsOfNoRun(isSetupRead_ ? "The run did not begin" : "The setup is refused");

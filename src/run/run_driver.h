@@ -58,6 +58,8 @@ class RunDriver final {
   void logSetup();
   void openResults();
   void putEarlierReportAside();
+  std::vector<KeptSeries> keptSeries() const;
+  void warnOfLastDay();
   void openSeries();
   /// Runs the task, if there is one, and writes its files.
   TaskOutcome runTask();
@@ -85,6 +87,7 @@ class RunDriver final {
   int endEarly(std::string_view ending);
   void endProgress(std::string_view ending);
   std::string warningCountText() const;
+  std::string whereWarningsAre() const;
   void tellOfWarnings() const;
   std::vector<std::string> closingLines(const Ending& ending) const;
 

@@ -62,7 +62,7 @@ void RunReporter::evaluationReplayed(std::span<const double> set, const Evaluati
   if (!result.shownSeries.empty()) {
     recordSeries(values, result);
   } else if (result.ok() && recorder_ != nullptr) {
-    recorder_->evaluationPassed(result.number, values);
+    recorder_->evaluationPassed(result, values, best());
   }
 }
 

@@ -234,9 +234,9 @@ TEST_F(LocalEvaluatorTest, SetsThatCannotBeRunAreNotStarted) {
   EXPECT_EQ(failureKindKey(results[0].failure->kind), "valueNotWritable");
   EXPECT_EQ(results[0].failure->reason, "the value -1e+120 of parameter \"a\" cannot be written in its field, " +
                                             folder_ / "base/parameters.tpl:2");
-  EXPECT_THAT(
-      refusalOf([&] { evaluate(makeEvaluator(launcher, 1, 9), {9.5}); }),
-      HasSubstr("\nfailed evaluations: 1, 1 of them not run as they violate the constraints; at most 0 may fail"));
+  EXPECT_THAT(refusalOf([&] { evaluate(makeEvaluator(launcher, 1, 9), {9.5}); }),
+              HasSubstr("\nfailed evaluations: 1, 1 of them not run as they violate a constraint or an equation has no "
+                        "finite value; at most 0 may fail"));
 }
 
 TEST_F(LocalEvaluatorTest, CancellationHaltsWhatRunsAndStartsNothing) {

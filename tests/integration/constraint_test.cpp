@@ -31,7 +31,9 @@ TEST(Constraints, NearTheOptimumCostASearchNoEvaluation) {
     ASSERT_EQ(run.exitCode, 0) << run.error;
     const std::string log = folder.read("basin.log");
     EXPECT_THAT(log, AllOf(HasSubstr(" model evaluations, 0 of them failed\n"),
-                           HasSubstr("\nProposed points that violated a constraint and were replaced")));
+                           HasSubstr("\nProposed points that cannot be run (a constraint is violated, or an equation "
+                                     "has no finite value) and "
+                                     "were replaced")));
     double best = 1e30;
     for (const auto& row : readDataTable(folder.read("basin_Optimisation.dat")).rows) {
       EXPECT_LE(std::stod(row[2]) + std::stod(row[3]), 6.9);
@@ -43,7 +45,8 @@ TEST(Constraints, NearTheOptimumCostASearchNoEvaluation) {
     folder.editSetup("'a + b'", "'abs(a - 4 * b)'");
     folder.editSetup("'6.9'", "'0'");
     ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0);
-    EXPECT_THAT(folder.read("basin.log"), HasSubstr("set already evaluated: do the constraints leave any width?"));
+    EXPECT_THAT(folder.read("basin.log"),
+                HasSubstr("set already evaluated: do constraints and equations leave any width?"));
   }
 }
 
@@ -71,13 +74,15 @@ TEST(Constraints, TellOfASampleOfWhichTooManySetsViolateThemBeforeTheFirstRunAnd
   const RunSettings settings{.option = 3, .maxEvaluations = 60};  // of a + b about 7
   ProgramResult run = runConstrained(folder, settings);
   EXPECT_EQ(run.exitCode, 1);
-  EXPECT_THAT(run.error, AllOf(HasSubstr(" of 60 sets of the sample, which are not run and fail: No. "),
+  EXPECT_THAT(run.error, AllOf(HasSubstr(" of 60 sets of the sample are not run and fail, as they violate a "),
                                HasSubstr("With Redraw_Infeasible = 1 in UNCERTAINTY_ESTIMATION")));
   std::string log = folder.read("basin.log");
-  EXPECT_LT(log.find("Warning: Constraints are violated by "), log.find("Evaluation of parameter set No. 1 "));
-  EXPECT_THAT(log,
-              AllOf(HasSubstr("\nfailed evaluations: 7, 7 of them not run as they violate the constraints; at most"),
-                    Not(HasSubstr("model run error")), Not(HasSubstr("failed model run"))));
+  EXPECT_LT(log.find("sets of the sample are not run and fail, as they violate a "),
+            log.find("Evaluation of parameter set No. 1 "));
+  EXPECT_THAT(log, AllOf(HasSubstr("\nfailed evaluations: 7, 7 of them not run as they violate a constraint or "
+                                   "an equation has no finite value; at most"),
+                         HasSubstr("\n1 warning: the lines above that begin with \"Warning: \"\n"),
+                         Not(HasSubstr("model run error")), Not(HasSubstr("failed model run"))));
   EXPECT_THAT(folder.read("calSimErr.dat"), HasSubstr(" (parameter constraints violated)\n"));
 
   // Hardly any set, and none.
@@ -88,7 +93,7 @@ TEST(Constraints, TellOfASampleOfWhichTooManySetsViolateThemBeforeTheFirstRunAnd
     run = runProgram({folder / "basin.kdx"});
     EXPECT_EQ(run.exitCode, redraws ? 0 : 1);
     EXPECT_THAT(folder.read("basin.log"), HasSubstr(said));
-    EXPECT_THAT(run.error, HasSubstr(redraws ? "The constraints leave less than 1 %" : said));
+    EXPECT_THAT(run.error, HasSubstr(redraws ? "Less than 1 % of the sets drawn can be run" : said));
     EXPECT_THAT(run.error, Not(HasSubstr("With Redraw_Infeasible = 1 in")));
   }
 

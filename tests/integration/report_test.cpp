@@ -116,11 +116,26 @@ TEST(Report, OfASensitivityAnalysisLeavesOutWhatIsOfOtherSetsThanThoseOfTheSetup
   std::filesystem::remove(folder / "basin_Sensitivities.dat");  // those of an unfinished run come from its rows
   EXPECT_EQ(makeReport(folder).exitCode, 0);
   EXPECT_THAT(reportData(folder), AllOf(HasSubstr(R"("derivatives":[[-0.8194029,-0.8194029],[null,null]])"),
-                                        HasSubstr(R"("notes":["Evaluations of other parameter sets than)"),
-                                        HasSubstr(R"(the derivatives that need them: No. 3, 4."])")));
+                                        HasSubstr("Evaluations of other parameter sets than"),
+                                        HasSubstr(R"(the derivatives that need them: No. 3, 4.",)")));
 }
 
 // Results without the files that this version adds: the report has all that the others hold.
+TEST(Report, SaysWhyTheRankingOfASensitivityAnalysisIsAnother) {
+  const ModelFolder folder;
+  ASSERT_EQ(runProgram({folder.writeSetup({.option = 1})}).exitCode, 0);
+  const std::string table = folder.read("basin_Sensitivities.dat");
+  const auto rankingNote = [&folder] {
+    EXPECT_EQ(makeReport(folder).exitCode, 0);
+    return reportData(folder);
+  };
+  EXPECT_THAT(rankingNote(), Not(HasSubstr("The ranking is not")));
+  folder.write("basin_Sensitivities.dat", table.substr(0, table.rfind('\n', table.size() - 2) + 1));
+  EXPECT_THAT(rankingNote(), HasSubstr("observations: basin_Sensitivities.dat is cut off or damaged."));
+  std::filesystem::remove(folder / "basin_Sensitivities.dat");
+  EXPECT_THAT(rankingNote(), HasSubstr("observations: basin_Sensitivities.dat: No such file or directory."));
+}
+
 TEST(Report, OfResultsOfAnEarlierVersion) {
   const ModelFolder folder;
   std::vector<std::string> scenarios{"9, 1, 1"};
@@ -188,6 +203,19 @@ TEST(Report, SaysWhatIsMissingInItsFilesAndIsNotMadeOfWhatIsNotThere) {
   folder.editSetup("Restart = 0", "Restart = 1");
   ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0);
   EXPECT_THAT(reportData(folder), HasSubstr("is cut off or damaged: only 31 of its 365 rows are taken up"));
+  // What the setup says now is not what the results depend on.
+  cutTo("basin_Series.dat", 0);
+  std::filesystem::remove(folder / "basin_Band_1.csv");
+  folder.editSetup("Sample_Size = 5", "Sample_Size = 6");
+  EXPECT_EQ(makeReport(folder).exitCode, 0);
+  EXPECT_THAT(
+      reportData(folder),
+      AllOf(HasSubstr("The setup was changed since: Sample_Size of UNCERTAINTY_ESTIMATION: 5 then, 6 now. The "),
+            HasSubstr("basin_Band_1.csv is not there, and its band is not shown.")));
+  cutTo("basin_Restart.dat", 200);
+  EXPECT_EQ(makeReport(folder).exitCode, 0);
+  EXPECT_THAT(reportData(folder), HasSubstr("since is not known: basin_Restart.dat: it is cut off or damaged."));
+  folder.editSetup("Sample_Size = 6", "Sample_Size = 5");
   folder.editSetup("Option = 3", "Option = 0");
   EXPECT_THAT(
       makeReport(folder).error,

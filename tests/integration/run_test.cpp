@@ -123,6 +123,22 @@ TEST(Scenarios, ASingleRunEvaluatesTheInitialSet) {
 }
 
 /// What it writes to its standard outputs must not get into the files that it opens.
+TEST(Scenarios, AnEndWithoutATimeOfDaySaysWhatItLeavesOut) {
+  const ModelFolder folder;
+  const std::string setup = folder.writeSetup({.option = 0});
+  folder.write("observed.csv", folder.read("observed.csv") + "2001-12-31 06:00,1\n");
+  for (const auto& [end, isWarned] :
+       {std::pair("2001-12-31", true), {"2001-12-30", false}, {"'2001-12-31 06:00'", false}}) {
+    folder.writeSetup({.option = 0});
+    folder.editSetup("End_Date = 2001-12-31", std::string("End_Date = ") + end);
+    ASSERT_EQ(runProgram({setup}).exitCode, 0);
+    const char* const warning =
+        "Warning: End_Date = 2001-12-31 00:00 is the beginning of its day: the later observations of that day are left "
+        "out (output measure \"flow\", 2001-12-31 06:00 ...). With a time of day, such as 23:59, they count\n";
+    EXPECT_EQ(folder.read("basin.log").find(warning) != std::string::npos, isWarned) << end;
+  }
+}
+
 TEST(FailedRuns, ARunWithItsStandardOutputsClosedLeavesTheSameResults) {
   const ModelFolder folder;
   std::filesystem::create_directory(folder / "basin_Report.html.tmp");  // in the way of the report

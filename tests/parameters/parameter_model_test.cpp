@@ -157,7 +157,14 @@ TEST(ParameterModel, SaysWhyASetIsNotRun) {
   }
   EXPECT_EQ(model.MapToModelValues(std::vector<double>{1, 3}).index(), 0);
   EXPECT_TRUE(model.feasibility().holds(std::vector<double>{1, 3}));
-  EXPECT_FALSE(ParameterModel({variable("a")}, {}).feasibility().isTested()) << "nothing is asked without constraints";
+  EXPECT_FALSE(ParameterModel({variable("a")}, {}).feasibility().isTested()) << "nothing can be wrong with its sets";
+  // Equations alone are tested, too.
+  ParameterModel ofEquations({variable("a"), dependent("d", "ln(a)")}, {});
+  EXPECT_EQ(ofEquations.feasibility().violation(std::vector<double>{-1}),
+            "the equation of parameter \"d\" gives NaN: ln(a)");
+  EXPECT_TRUE(ofEquations.feasibility().holds(std::vector<double>{1}));
+  EXPECT_EQ(ofEquations.feasibility().noSetMessage(),
+            "Error: No parameter set found for which all equations have a finite value");
 }
 
 }  // namespace

@@ -125,6 +125,8 @@ TEST(ParameterTemplate, RefusesWhatItCannotFill) {
       {"!\n!K! !Maning channel !", "Error: Parameter name Maning channel in template file Maning channel invalid",
        "t:2:5: no parameter has the name \"Maning channel\", which is between two ! here\ndid you mean \"Manning "
        "channel\"?"},
+      {"!\n!K\t !", "Error: Parameter name K\\t in template file K\\t invalid",
+       "t:2:1: no parameter has the name \"K\\t\", which is between two ! here\nIt has a tab, written as \\t in"},
       {"!\n!k!", "Error: Parameter name k in template file k invalid", "did you mean \"K\"?"},
   };
   for (const auto& [text, message, detail] : cases) {

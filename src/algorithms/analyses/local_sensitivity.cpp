@@ -127,7 +127,7 @@ ParameterDifference planDifference(const Step& step, bool central, std::size_t j
   }
   if (oneSideIsViolated && (wantsBoth || goesUp != wantsUp)) {
     difference.warnings.push_back(fmt::format(
-        "the step {} violates a constraint: the difference is {} ({})", violationAbove ? "up" : "down",
+        "the step {} cannot be run: the difference is {} ({})", violationAbove ? "up" : "down",
         central ? "one-sided" : "that of the other side", violationAbove ? *violationAbove : *violationBelow));
   } else if (central && !difference.isCentral()) {
     difference.warnings.push_back(fmt::format("its {} bound leaves no room for the step: the difference is one-sided",

@@ -24,6 +24,7 @@ SeriesBand seriesBand(std::span<const double> observed, std::span<const Evaluati
   SeriesBand band;
   std::size_t inside = 0;
   std::vector<double> values;
+  std::vector<std::size_t> runs;
   for (std::size_t t = 0; t < observed.size(); ++t) {
     values.clear();
     for (const EvaluationResult& result : results) {
@@ -37,7 +38,15 @@ SeriesBand seriesBand(std::span<const double> observed, std::span<const Evaluati
     band.upper.push_back(sortedQuantile(values, 0.95));
     if (values.empty()) continue;
     ++band.observationCount;
+    runs.push_back(values.size());
     if (observed[t] >= band.lower[t] && observed[t] <= band.upper[t]) ++inside;
+  }
+  if (!runs.empty()) {
+    const auto [fewest, most] = std::minmax_element(runs.begin(), runs.end());
+    band.fewestRuns = *fewest;
+    band.mostRuns = *most;
+    band.fewerRunsCount = static_cast<std::size_t>(
+        std::count_if(runs.begin(), runs.end(), [most = *most](std::size_t count) { return count < most; }));
   }
   band.shareInside = band.observationCount == 0
                          ? std::numeric_limits<double>::quiet_NaN()
@@ -45,9 +54,19 @@ SeriesBand seriesBand(std::span<const double> observed, std::span<const Evaluati
   return band;
 }
 
+std::string fewerRunsText(const SeriesBand& band) {
+  if (band.fewerRunsCount == 0) return "";
+  return fmt::format(
+      "at {} of {} observations the quantiles are of fewer runs than at the others, of {} to {}: runs have "
+      "no value there",
+      band.fewerRunsCount, band.observationCount, band.fewestRuns, band.mostRuns);
+}
+
 std::string seriesBandText(std::string_view title, const ObservedSeries& observed, const SeriesBand& band) {
   constexpr double kSecondsPerDay = 86400.0;
-  std::string text = fmt::format("# Band of {}\ntime,observed,5 %,50 %,95 %\n", columnName(title));
+  std::string text = fmt::format("# Band of {}\n", columnName(title));
+  if (const std::string fewer = fewerRunsText(band); !fewer.empty()) text += fmt::format("# {}\n", fewer);
+  text += "time,observed,5 %,50 %,95 %\n";
   const std::int64_t origin = secondNumber(observed.start);
   for (std::size_t t = 0; t < observed.days.size(); ++t) {
     const DateRecord time = dateOfSecond(origin + std::llround(observed.days[t] * kSecondsPerDay));

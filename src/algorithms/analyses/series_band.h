@@ -17,6 +17,9 @@ struct SeriesBand {
   std::vector<double> median;        ///< 50 % quantile
   std::vector<double> upper;         ///< 95 % quantile
   std::size_t observationCount = 0;  ///< observations that have a band
+  std::size_t fewestRuns = 0;        ///< least number of values behind the quantiles of an observation that has a band
+  std::size_t mostRuns = 0;          ///< largest
+  std::size_t fewerRunsCount = 0;    ///< observations with fewer than the largest number
   double shareInside = 0.0;          ///< share of those inside the band, limits included; NaN when there are none
 };
 
@@ -24,6 +27,8 @@ struct SeriesBand {
 /// evaluation's simulated values; `observed` holds its observations. Values that are not finite are left out.
 SeriesBand seriesBand(std::span<const double> observed, std::span<const EvaluationResult> results, std::size_t first);
 
+/// "its quantiles are of 3 to 20 runs ..."; empty where all are of equally many.
+std::string fewerRunsText(const SeriesBand& band);
 /// The band as a time-series file: the columns time, observed, 5 %, 50 % and 95 %, one row per observation.
 std::string seriesBandText(std::string_view title, const ObservedSeries& observed, const SeriesBand& band);
 

@@ -83,8 +83,9 @@ const SettingSection<UncertaintySection>& uncertaintySection() {
             [](auto& s) -> auto& { return s.settings.redrawsInfeasible; },
             {.name = "Redraw_Infeasible",
              .defaultValue = "0",
-             .meaning = "1: sets that violate a constraint are drawn again until all sets can be run. 0: they are not "
-                        "run and count as failed."})}}};
+             .meaning =
+                 "1: sets that violate a constraint, or for which an equation has no finite value, are drawn again "
+                 "until all sets can be run. 0: they are not run and count as failed."})}}};
   return section;
 }
 
@@ -127,6 +128,18 @@ std::vector<ParameterSet> drawSample(const UncertaintySettings& settings, Unifor
   return sample;
 }
 
+/// Ends an analysis that has drawn as often as it may; `complete` sets at the beginning of the sample can be run.
+[[noreturn]] void failRedrawing(const Feasibility& feasibility, std::size_t complete, const FeasibleSample& sample,
+                                std::string_view violation) {
+  const double rate = 100.0 * static_cast<double>(complete) / static_cast<double>(sample.drawnCount);
+  fatalError(
+      complete == 0 ? feasibility.noSetMessage() : "Error: Too few parameter sets found that can be run",
+      fmt::format("{} of the {} sets wanted, of {} drawn, an acceptance rate of {:.2g} %; the last one: {}\nMake "
+                  "means, standard deviations and constraints (or equations) agree, so that more of the sets "
+                  "drawn can be run, or take a smaller Sample_Size",
+                  complete, sample.sets.size(), sample.drawnCount, rate, violation));
+}
+
 }  // namespace
 
 std::vector<ParameterSet> uncertaintySample(const UncertaintySettings& settings, std::int32_t seed,
@@ -149,9 +162,7 @@ FeasibleSample feasibleUncertaintySample(const UncertaintySettings& settings, st
   for (ParameterSet& set : sample.sets) {
     while (const auto violation = feasibility.violation(set)) {
       if (redraws++ == most) {
-        fatalError("Error: No parameter set found that satisfies the constraints",
-                   fmt::format("{} of the {} sets wanted, of {} drawn; the last one: {}", feasible, sample.sets.size(),
-                               sample.drawnCount, *violation));
+        failRedrawing(feasibility, feasible, sample, *violation);
       }
       set = std::move(drawSample(single, random, messages).front());
       ++sample.drawnCount;

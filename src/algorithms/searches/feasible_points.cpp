@@ -57,7 +57,7 @@ void FeasiblePoints::replaceInSample(std::vector<ParameterSet>& sample, std::siz
   if (!known_) {
     const ParameterSet& last = sample.empty() ? bounds.initial : sample.back();
     fatalError(
-        "Error: No parameter set found that satisfies the constraints",
+        feasibility_.noSetMessage(),
         fmt::format("{} sets drawn between the bounds cannot be run{}; one of them: {}",
                     unusable.size() + static_cast<std::size_t>(before - drawsLeft_),
                     hasInitial ? ", nor can the initial values" : "", feasibility_.violation(last).value_or("")));

@@ -25,8 +25,8 @@ class FeasiblePoints final {
 
   /// Replaces the sets of an initial sample from index `first` on, those before being given; a set is drawn again
   /// uniformly within the bounds, at most kMostSampleDraws times, and then drawn back towards a point that can be run.
-  /// Throws FatalError "Error: No parameter set found that satisfies the constraints" if no such point is known: not
-  /// in the sample, not the initial set and not among a million drawn.
+  /// Throws FatalError with noSetMessage() if no such point is known: not in the sample, not the initial set and not
+  /// among a million drawn.
   void replaceInSample(std::vector<ParameterSet>& sample, std::size_t first, const SearchBounds& bounds,
                        UniformGenerator& random);
 

@@ -20,7 +20,11 @@ constexpr std::string_view kSetupEnding = ".kdx";
 /// Whether `text`, the part of a name after that of the setup, is that of a run's file. A killed run may have left it
 /// half-written, with kTemporaryEnding at the end.
 bool matches(std::string_view text, const RunFile& file) {
-  if (text.ends_with(kTemporaryEnding)) text.remove_suffix(kTemporaryEnding.size());
+  if (text.ends_with(kTemporaryEnding)) {
+    text.remove_suffix(kTemporaryEnding.size());
+    const std::size_t dot = text.rfind('.');  // that of the report has the number of the process, too
+    if (file == run_files::kReport && dot != text.npos && isDigits(text.substr(dot + 1))) text = text.substr(0, dot);
+  }
   if (!takeText(text, file.stem) || (file.isNumbered && takeDigits(text).empty())) return false;
   if (text == file.extension) return true;
   return takeText(text, ".") && !takeDigits(text).empty() && text == file.extension;

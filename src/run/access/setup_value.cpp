@@ -155,6 +155,9 @@ std::string wantedCode(std::span<const CodeName> codes) {
 std::string nearestCode(std::span<const CodeName> codes, std::string_view written) {
   std::vector<std::string> names;
   for (const CodeName& code : codes) names.emplace_back(code.name);
+  const bool isOperator = std::find(names.begin(), names.end(), "<=") != names.end();
+  if (isOperator && (written == "==" || written == "="))
+    return "; what must be equal needs two constraints, '<=' and '>='";
   const auto nearest = nearestName(written, names);
   return nearest ? fmt::format(", did you mean '{}'?", *nearest) : "";
 }

@@ -8,6 +8,7 @@
 #include <fmt/core.h>
 
 #include "common/files.h"
+#include "common/run_files.h"
 
 namespace mirevo {
 namespace {
@@ -43,12 +44,16 @@ void SeriesRecorder::resume(const SeriesTable& table) {
     std::optional<Held> held;
     if (!evaluation) return held;
     held.emplace().evaluation = *evaluation;
+    bool isThere = false;
     for (const std::string& measure : run_.measures) {
       PeriodSeries& series = held->series.emplace_back();
       const auto found = std::find_if(table.series.begin(), table.series.end(),
                                       [&measure](const ShownSeries& shown) { return shown.measure == measure; });
       if (found != table.series.end()) series = {found->seconds, (*found).*column};
+      isThere =
+          isThere || std::any_of(series.values.begin(), series.values.end(), [](float v) { return !std::isnan(v); });
     }
+    if (!isThere) held.reset();  // the file says so, and they may come again
     return held;
   };
   initial_ = takeOver(table.initial, &ShownSeries::initial);
@@ -62,7 +67,7 @@ void SeriesRecorder::evaluationFinished(const EvaluationResult& result, std::spa
   if (!result.shownSeries.empty()) {
     holdInitial(result, values);
     if (std::isnan(result.aggregate)) {
-      holdUnsettled(result, values);
+      holdUnsettled({{result.number, result.aggregate}, {values.begin(), values.end()}, result.shownSeries});
     } else if (best && (best->number == result.number || isSame(best->parameterValues, values))) {
       // The final model run of the best set repeats the best evaluation.
       const Held finished{{best->number, best->aggregate}, {values.begin(), values.end()}, result.shownSeries};
@@ -78,15 +83,42 @@ void SeriesRecorder::holdInitial(const EvaluationResult& result, std::span<const
   isChanged_ = true;
 }
 
-void SeriesRecorder::evaluationPassed(int number, std::span<const double> values) {
-  if (initialChoice_.consider(number, values)) initial_.reset();
+void SeriesRecorder::evaluationPassed(const EvaluationResult& result, std::span<const double> values,
+                                      const std::optional<BestEvaluation>& best) {
+  isContinued_ = true;
+  if (initialChoice_.consider(result.number, values)) {
+    initial_ = heldOfKept(result, values);
+    isChanged_ = true;
+  }
+  if (std::isnan(result.aggregate)) {
+    if (auto held = heldOfKept(result, values)) holdUnsettled(*std::move(held));
+  } else if (best && best->number == result.number && (!best_ || best_->evaluation.number != best->number)) {
+    if (const auto held = heldOfKept(result, values)) follow(best, &*held);
+  }
 }
 
-void SeriesRecorder::holdUnsettled(const EvaluationResult& result, std::span<const double> values) {
-  const std::size_t steps = stepCount(result.shownSeries);
+std::optional<SeriesRecorder::Held> SeriesRecorder::heldOfKept(const EvaluationResult& result,
+                                                               std::span<const double> values) const {
+  if (run_.kept.empty() || result.simulatedValues.empty()) return std::nullopt;
+  Held held{{result.number, result.aggregate}, {values.begin(), values.end()}, {}, true};
+  for (const KeptSeries& kept : run_.kept) {
+    PeriodSeries& series = held.series.emplace_back();
+    for (std::size_t i = 0; i < kept.seconds.size(); ++i) {
+      const std::size_t index = kept.first + i;
+      const double value = index < result.simulatedValues.size() ? result.simulatedValues[index] : std::nan("");
+      series.seconds.push_back(kept.seconds[i]);
+      series.values.push_back(static_cast<float>(value));
+    }
+  }
+  return held;
+}
+
+void SeriesRecorder::holdUnsettled(Held held) {
+  const std::size_t steps = stepCount(held.series);
   if (unsettledSteps_ + steps > kMostUnsettledSteps) return;
   unsettledSteps_ += steps;
-  unsettled_[result.number] = {{result.number, result.aggregate}, {values.begin(), values.end()}, result.shownSeries};
+  const int number = held.evaluation.number;
+  unsettled_[number] = std::move(held);
 }
 
 /// Keeps the series of the run's best evaluation: the one that has just finished, or one whose aggregate was not known
@@ -116,10 +148,44 @@ void SeriesRecorder::aggregateSettled(int number, double aggregate) {
 void SeriesRecorder::finish(const std::optional<BestEvaluation>& best) {
   try {
     follow(best, nullptr);
+    if (best && (!best_ || best_->evaluation.number != best->number)) {
+      best_ = Held{{best->number, best->aggregate}, best->parameterValues, {}};
+      isChanged_ = true;
+    }
+    if (!hasEnded_) warnOfMissing();
+    hasEnded_ = true;
     if (isChanged_) write();
   } catch (const std::exception& error) {  // out of memory: the end of the run must not fail
     warn(error.what());
   }
+}
+
+std::string SeriesRecorder::missing(std::string_view which, int number) const {
+  return fmt::format("The series of the {} evaluation, No. {}, are not in {}: {}", which, number, fileNameOf(path_),
+                     isContinued_ ? "they were not written yet when the run was interrupted" : "they were not kept");
+}
+
+/// What a reader of the file cannot see in it.
+std::vector<std::string> SeriesRecorder::notes() const {
+  std::vector<std::string> lines;
+  const auto add = [&](std::string_view which, int number, const std::optional<Held>& held) {
+    if (!held || held->series.empty()) {
+      lines.push_back(missing(which, number));
+    } else if (held->isOfKept) {
+      lines.push_back(
+          fmt::format("The series of the {} evaluation, No. {}, are there at the times of the observations "
+                      "alone: they were not written yet when the run was interrupted",
+                      which, number));
+    }
+  };
+  if (const auto& number = initialChoice_.number()) add("initial", *number, initial_);
+  if (best_) add("best", best_->evaluation.number, best_);
+  return lines;
+}
+
+void SeriesRecorder::warnOfMissing() {
+  if (const auto& number = initialChoice_.number(); number && !initial_) warn_(missing("initial", *number));
+  if (best_ && best_->series.empty()) warn_(missing("best", best_->evaluation.number));
 }
 
 void SeriesRecorder::warn(std::string_view reason) {
@@ -131,6 +197,10 @@ void SeriesRecorder::write() {
   const double begun = clock_();
   SeriesTable table;
   table.headLines = run_.headLines;
+  if (hasEnded_) {
+    const std::vector<std::string> lines = notes();
+    table.headLines.insert(table.headLines.end(), lines.begin(), lines.end());
+  }
   table.task = run_.task;
   if (initial_) table.initial = initial_->evaluation;
   table.isOfInitialParameters = initialChoice_.hasSetupValues();
@@ -148,7 +218,7 @@ ShownSeries SeriesRecorder::shownSeries(std::size_t pair) const {
   static const PeriodSeries kNone;
   const PeriodSeries& observed = run_.observations[pair];
   const PeriodSeries& initial = initial_ ? initial_->series[pair] : kNone;
-  const PeriodSeries& best = best_ ? best_->series[pair] : kNone;
+  const PeriodSeries& best = best_ && !best_->series.empty() ? best_->series[pair] : kNone;
   ShownSeries shown;
   shown.measure = run_.measures[pair];
   for (const PeriodSeries* series : {&observed, &initial, &best}) {

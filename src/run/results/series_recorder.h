@@ -1,5 +1,7 @@
 #pragma once
 
+#include <cstddef>
+#include <cstdint>
 #include <functional>
 #include <map>
 #include <optional>
@@ -15,6 +17,12 @@
 
 namespace mirevo {
 
+/// Where the series of a pair is among the simulated values that are kept of an evaluation.
+struct KeptSeries {
+  std::size_t first = 0;
+  std::vector<std::int64_t> seconds;  ///< secondNumber() of the observations
+};
+
 /// What the recorder needs to know of a run. `measures` and `observations` have one entry per pair of series that is
 /// compared.
 struct RecordedSeries {
@@ -25,6 +33,7 @@ struct RecordedSeries {
   std::int64_t periodFirst = 0;            ///< secondNumber() of the ends of the period
   std::int64_t periodLast = 0;
   std::vector<double> initialValues;  ///< initial values of the variable parameters, model scale
+  std::vector<KeptSeries> kept = {};  ///< of the pairs, for a task that keeps the simulated values of all evaluations
 };
 
 /// Keeps `<setup>_Series.dat`: the simulated series of the initial and of the best evaluation so far. The file is
@@ -43,13 +52,16 @@ class SeriesRecorder final {
   void evaluationFinished(const EvaluationResult& result, std::span<const double> values,
                           const std::optional<BestEvaluation>& best);
 
-  /// Takes a successful evaluation of an earlier run, of which there is no series unless resume() has taken it over.
-  void evaluationPassed(int number, std::span<const double> values);
+  /// Takes a successful evaluation of an earlier run. Of its series there is what resume() has taken over, or else what
+  /// was kept of its simulated values, at the times of the observations.
+  void evaluationPassed(const EvaluationResult& result, std::span<const double> values,
+                        const std::optional<BestEvaluation>& best);
 
   /// Takes the aggregate of an evaluation for which it was not known before.
   void aggregateSettled(int number, double aggregate);
 
-  /// At the end of the run: writes what is not written yet; never throws. `best` is the best evaluation of the run.
+  /// At the end of the run: writes what is not written yet, and warns of series that are not there; never throws.
+  /// `best` is the best evaluation of the run.
   void finish(const std::optional<BestEvaluation>& best);
 
  private:
@@ -57,11 +69,16 @@ class SeriesRecorder final {
   struct Held {
     ShownEvaluation evaluation;
     std::vector<double> values;
-    std::vector<PeriodSeries> series;
+    std::vector<PeriodSeries> series;  ///< empty if they are not there
+    bool isOfKept = false;             ///< at the times of the observations alone
   };
   void holdInitial(const EvaluationResult& result, std::span<const double> values);
-  void holdUnsettled(const EvaluationResult& result, std::span<const double> values);
+  void holdUnsettled(Held held);
   void follow(const std::optional<BestEvaluation>& best, const Held* finished);
+  std::optional<Held> heldOfKept(const EvaluationResult& result, std::span<const double> values) const;
+  std::vector<std::string> notes() const;
+  std::string missing(std::string_view which, int number) const;
+  void warnOfMissing();
   void write();
   void warn(std::string_view reason);
   ShownSeries shownSeries(std::size_t pair) const;
@@ -78,6 +95,8 @@ class SeriesRecorder final {
   bool isChanged_ = false;
   double nextWrite_ = 0.0;  ///< not before this time
   bool hasWarned_ = false;
+  bool hasEnded_ = false;
+  bool isContinued_ = false;  ///< evaluations of an earlier run have passed
 };
 
 }  // namespace mirevo

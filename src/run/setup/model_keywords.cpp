@@ -184,8 +184,8 @@ const SettingSection<RunConfig>& judgementSection() {
                            {.name = "Start_Date", .meaning = "Start of the evaluation period, inclusive."}),
         checked<RunConfig>(setting<RunConfig>([](auto& c) -> auto& { return c.period.end; },
                                               {.name = "End_Date",
-                                               .meaning = "End of the evaluation period, inclusive. Not before the "
-                                                          "start."}),
+                                               .meaning = "End of the evaluation period, inclusive; a date "
+                                                          "alone means its 00:00. Not before the start."}),
                            [](const RunConfig& config) { return validateEvaluationPeriod(config.period); }),
         setting<&RunConfig::aggregationMethod>(
             {.name = "Aggregation_Method",

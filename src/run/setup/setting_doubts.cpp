@@ -1,7 +1,6 @@
 #include "run/setup/setting_doubts.h"
 
 #include <algorithm>
-#include <cmath>
 #include <cstddef>
 #include <cstdint>
 #include <filesystem>
@@ -55,19 +54,11 @@ void warnOfIdValues(const RunConfig& config, const SectionsRead& sections) {
   }
 }
 
-/// The value on the grid of an integer parameter; logarithms are not taken here.
-double onGrid(const ModelParameter& parameter, double value) {
-  bool failed = false;
-  return TransformParameterValue(value, parameter.lowerBound, TransformationType::integer, TransformDirection::forward,
-                                 failed);
-}
-
 void warnOffGrid(const ModelParameter& parameter, double value, std::string_view keyword, const SetupSection& section) {
-  constexpr double kRounding = 1.0e-6;
-  const double taken = onGrid(parameter, value);
-  if (std::abs(taken - value) <= kRounding) return;
-  section.warn(keyword, fmt::format("{} is not a whole number of steps above Lower_Bound = {}, {} is taken",
-                                    formatReal(value), formatReal(parameter.lowerBound), formatReal(taken)));
+  if (isOnGrid(parameter, value)) return;
+  section.warn(keyword,
+               fmt::format("{} is not a whole number of steps above Lower_Bound = {}, {} is taken", formatReal(value),
+                           formatReal(parameter.lowerBound), formatReal(onGrid(parameter, value))));
 }
 
 void warnOfParameters(const RunConfig& config, const SectionsRead& sections) {
@@ -77,10 +68,7 @@ void warnOfParameters(const RunConfig& config, const SectionsRead& sections) {
       sections.parameters[i].warn("Parameter_Equation",
                                   "not used, as only Parameter_Type = 2 makes a parameter dependent");
     }
-    if (parameter.parameterType != ParameterType::variable ||
-        parameter.transformationType != TransformationType::integer) {
-      continue;
-    }
+    if (parameter.parameterType != ParameterType::variable) continue;
     warnOffGrid(parameter, parameter.initialValue, "Initial_Value", sections.parameters[i]);
     warnOffGrid(parameter, parameter.upperBound, "Upper_Bound", sections.parameters[i]);
   }
@@ -88,8 +76,7 @@ void warnOfParameters(const RunConfig& config, const SectionsRead& sections) {
 
 bool hasOneValue(const ModelParameter& parameter) {
   if (parameter.parameterType != ParameterType::variable) return true;
-  const bool isInteger = parameter.transformationType == TransformationType::integer;
-  return (isInteger ? onGrid(parameter, parameter.upperBound) : parameter.upperBound) <= parameter.lowerBound;
+  return onGrid(parameter, parameter.upperBound) <= parameter.lowerBound;
 }
 
 void warnOfMeasures(const RunConfig& config, const SectionsRead& sections) {

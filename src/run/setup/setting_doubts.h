@@ -10,12 +10,14 @@ namespace mirevo {
 
 /// The sections from which a RunConfig was read, for the locations of warnings; of lists one per item.
 struct SectionsRead {
+  std::vector<SetupSection> batchItems;
   std::vector<SetupSection> parameterFiles;
   std::vector<SetupSection> parameters;
   std::optional<SetupSection> judgement;  ///< ObjectiveFunctions
   std::vector<SetupSection> measures;
   std::vector<SetupSection> objectives;
-  std::optional<SetupSection> slots;  ///< SimultaneousSimulations
+  std::optional<SetupSection> measureFile;  ///< OUTPUT_MEASURE_FILE
+  std::optional<SetupSection> slots;        ///< SimultaneousSimulations
 };
 
 /// Warns of settings that are valid, each for itself, and of which it is certain that they cannot yield what is wanted

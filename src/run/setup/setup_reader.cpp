@@ -16,6 +16,7 @@
 #include "platform/processes/argument_text.h"
 #include "run/access/file_validation.h"
 #include "run/setup/equation_check.h"
+#include "run/setup/file_roles.h"
 #include "run/setup/model_keywords.h"
 #include "run/setup/run_keywords.h"
 #include "run/setup/setting_doubts.h"
@@ -70,6 +71,7 @@ class SetupReader final {
     }
     readSimultaneousSimulations();
     readMeasureFile();
+    checkFileRoles(config_, sections_);
     warnOfDoubtfulSettings(config_, sections_);
     config_.resultSettings = std::move(file_.resultSettings());
     return std::move(config_);
@@ -111,7 +113,10 @@ void SetupReader::readSimulationOption() {
   }
   section.open("SIMBATCH")
       .readItems("SIMBATCHITEM_", batchItemSection(), config_.batchItems, "Error: No model simulation sequence defined",
-                 [this](const SetupSection& opened, const BatchItem& item) { checkBatchItem(opened, item); });
+                 [this](const SetupSection& opened, const BatchItem& item) {
+                   checkBatchItem(opened, item);
+                   sections_.batchItems.push_back(opened);
+                 });
   section.open("SIMPARAM")
       .readItems("SIMPARAMITEM_", parameterFileSection(), config_.parameterFiles,
                  "Error: No model parameter files defined",
@@ -349,6 +354,7 @@ void SetupReader::readSimultaneousSimulations() {
 void SetupReader::readMeasureFile() {
   const SetupSection section = target_.open("ObjectiveFunctions").open("OUTPUT_MEASURES").open("OUTPUT_MEASURE_FILE");
   section.read(measureFileSection(), config_);
+  sections_.measureFile = section;
   const bool isNeeded = std::any_of(config_.measures.begin(), config_.measures.end(), [](const OutputMeasure& measure) {
     return measure.interfaceType == InterfaceType::measureFile;
   });

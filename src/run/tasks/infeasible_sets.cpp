@@ -26,15 +26,17 @@ void warnOfInfeasibleSets(const TaskContext& context, std::span<const ParameterS
   }
   if (count == 0) return;
   if (count > kMostNumbers) numbers += fmt::format(" and {} more", count - kMostNumbers);
-  std::string text = fmt::format("Constraints are violated by {} of {} {}, which are not run and fail: No. {}\n   {}",
-                                 count, sets.size(), what, numbers, first);
+  std::string text =
+      fmt::format("{} of {} {} {} not run and {}, as {} a constraint or an equation has no finite value: No. {}\n   {}",
+                  count, sets.size(), what, count == 1 ? "is" : "are", count == 1 ? "fails" : "fail",
+                  count == 1 ? "it violates" : "they violate", numbers, first);
   const int limit = FailedRunPolicy(planned).limit();
   const bool endsRun = count > static_cast<std::size_t>(limit);
   if (endsRun) {
     text += fmt::format("\n   The run will end before it is complete: at most {} may fail, a tenth of the {} planned",
                         limit, planned);
     if (count == sets.size()) {
-      text += fmt::format("\n   None of the {} satisfies the constraints: check the constraints and the values", what);
+      text += fmt::format("\n   None of the {} can be run: check the constraints, the equations and the values", what);
     } else if (!remedy.empty()) {
       text.append("\n   ").append(remedy);
     }

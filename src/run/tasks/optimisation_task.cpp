@@ -2,6 +2,8 @@
 
 #include <algorithm>
 #include <cmath>
+#include <set>
+#include <span>
 #include <utility>
 
 #include <fmt/format.h>
@@ -73,11 +75,11 @@ void warnOfNoWidth(const TaskContext& context, const SearchSummary& summary, std
   const std::int64_t proposed =
       populationSize > 0 ? std::min<std::int64_t>(populationSize, summary.evaluationCount) : summary.evaluationCount;
   if (returned == 0 || returned < proposed || returned < summary.replacedCount) return;
-  context.log.warning(
-      fmt::format("{} of {} points that violated a constraint could only be replaced by a set already evaluated: do "
-                  "the constraints leave any width? A parameter that must equal an expression of others is one with "
-                  "Parameter_Type = 2",
-                  summary.returnedCount, summary.replacedCount));
+  context.log.warning(fmt::format(
+      "{} of {} points that cannot be run could only be replaced by a set already evaluated: do "
+      "constraints and equations leave any width? A parameter that must equal an expression of others is one with "
+      "Parameter_Type = 2",
+      summary.returnedCount, summary.replacedCount));
 }
 
 void logBestSet(const TaskContext& context, const ParameterSet& best, const EvaluationResult& result) {
@@ -86,6 +88,18 @@ void logBestSet(const TaskContext& context, const ParameterSet& best, const Eval
   logValues(context.log, "Best parameter set:", context.space.names, ToModelScale(context.space, best));
   logValues(context.log, "Objective functions:", objectives, result.objectiveValues);
   context.log.line(fmt::format("Aggregate: {}", formatReal(result.aggregate)));
+}
+
+void warnOffGrid(const ModelParameter& parameter, std::span<const double> values, const SetupSection& section) {
+  const auto isOff = [&parameter](double value) { return !isOnGrid(parameter, value); };
+  const auto first = std::find_if(values.begin(), values.end(), isOff);
+  if (first == values.end()) return;
+  section.warn(
+      kInitialSampleFileKeyword,
+      fmt::format("{} of the {} values of the integer parameter {} are not whole numbers of steps above "
+                  "Lower_Bound = {}; of the first, {}, {} is taken",
+                  std::count_if(first, values.end(), isOff), values.size(), quotedForMessage(parameter.name),
+                  formatReal(parameter.lowerBound), formatReal(*first), formatReal(onGrid(parameter, *first))));
 }
 
 }  // namespace
@@ -127,7 +141,7 @@ void OptimisationTask::read(const TaskReading& reading) {
   sample.read(initialSampleSection(), filled);
   if (initialSample.generation == SampleGeneration::fromFile) {
     validateFileOpens(initialSample.fileName, kInitialSampleFileKeyword, sample);
-    if (method->facts().drawsInitialSample) takeGivenValues(reading);
+    if (method->facts().drawsInitialSample) takeGivenValues(reading, sample);
   } else if (!initialSample.fileName.empty()) {
     sample.warn(kInitialSampleFileKeyword, fmt::format("not read, as Initial_Sample_Generation is {} and not 4",
                                                        static_cast<int>(initialSample.generation)));
@@ -140,7 +154,7 @@ void OptimisationTask::read(const TaskReading& reading) {
 }
 
 /// The values of the sample file, which runs get exactly.
-void OptimisationTask::takeGivenValues(const TaskReading& reading) {
+void OptimisationTask::takeGivenValues(const TaskReading& reading, const SetupSection& section) {
   GivenSample sample;
   try {
     sample = loadInitialSample(initialSample.fileName, BuildSearchSpace(reading.parameters));
@@ -153,7 +167,16 @@ void OptimisationTask::takeGivenValues(const TaskReading& reading) {
     if (parameter.parameterType != ParameterType::variable) continue;
     for (const ParameterSet& set : sample.modelScale) values.push_back(set[variable]);
     ++variable;
+    warnOffGrid(parameter, values, section);
   }
+  const std::size_t distinct = std::set<ParameterSet>(sample.sets.begin(), sample.sets.end()).size();
+  if (distinct == sample.sets.size()) return;
+  section.warn(kInitialSampleFileKeyword,
+               distinct == 1
+                   ? fmt::format("its {} sets are the same: a search proposes nothing else among equal points",
+                                 sample.sets.size())
+                   : fmt::format("{} of its {} sets are repetitions of others", sample.sets.size() - distinct,
+                                 sample.sets.size()));
 }
 
 std::vector<double> OptimisationTask::givenValues(std::size_t parameter) const {
@@ -285,9 +308,10 @@ TaskOutcome OptimisationTask::run(const TaskContext& context) {
   context.log.line("");
   context.log.line(summary.terminationMessage);
   if (summary.replacedCount > 0) {
-    context.log.line(
-        fmt::format("Proposed points that violated a constraint and were replaced before their evaluation: {}",
-                    summary.replacedCount));
+    context.log.line(fmt::format(
+        "Proposed points that cannot be run (a constraint is violated, or an equation has no finite value) and were "
+        "replaced before their evaluation: {}",
+        summary.replacedCount));
   }
   warnOfNoWidth(context, summary, method->populationSize());
   const std::vector<ParameterSet> best{summary.best};

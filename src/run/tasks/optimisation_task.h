@@ -41,7 +41,7 @@ class OptimisationTask final : public Task {
  private:
   /// Whether a surrogate model assists the search.
   bool usesSurrogate() const { return surrogateUse == SurrogateUse::yes && method->facts().usesSurrogate; }
-  void takeGivenValues(const TaskReading& reading);
+  void takeGivenValues(const TaskReading& reading, const SetupSection& section);
   void readMethod(const TaskReading& reading, const SetupSection& section) const;
   void readStopping(const SetupSection& section, std::size_t variableCount);
   void warnOfOneLoop(const SetupSection& section) const;

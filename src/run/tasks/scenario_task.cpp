@@ -66,12 +66,21 @@ void validateScenarioRun(std::span<const double> values, std::span<const ModelPa
   }
 }
 
-/// Warns once of each fixed parameter for which a run has another value; `told` says of which already.
-void warnOfFixedParameters(std::span<const double> values, std::span<const ModelParameter> parameters,
-                           const SetupSection& section, std::vector<bool>& told) {
+/// Warns once of each parameter for which a run has a value that it does not get; `told` says of which already.
+void warnOfUnusedValues(std::span<const double> values, std::span<const ModelParameter> parameters,
+                        const SetupSection& section, std::vector<bool>& told) {
   for (std::size_t i = 0; i < values.size(); ++i) {
     const ModelParameter& parameter = parameters[i];
-    if (parameter.parameterType != ParameterType::fixed || values[i] == parameter.initialValue || told[i]) continue;
+    if (told[i]) continue;
+    if (parameter.parameterType == ParameterType::variable && !isOnGrid(parameter, values[i])) {
+      told[i] = true;
+      section.warn(kValuesKeyword,
+                   fmt::format("value {}, {}, of the integer parameter {} is not a whole number of steps "
+                               "above Lower_Bound = {}, {} is taken; so for all such values",
+                               i + 1, formatReal(values[i]), quotedForMessage(parameter.name),
+                               formatReal(parameter.lowerBound), formatReal(onGrid(parameter, values[i]))));
+    }
+    if (parameter.parameterType != ParameterType::fixed || values[i] == parameter.initialValue) continue;
     told[i] = true;
     section.warn(kValuesKeyword,
                  fmt::format("value {}, {}, is not used: parameter {} is fixed at {}", i + 1, formatReal(values[i]),
@@ -111,7 +120,7 @@ void ScenarioTask::read(const TaskReading& reading) {
       .readItems("SCENARIO_", runSection(), settings.runs, "Error: No scenario runs defined",
                  [&reading, &told](const SetupSection& item, const ScenarioRun& run) {
                    validateScenarioRun(run.values, reading.parameters, item);
-                   warnOfFixedParameters(run.values, reading.parameters, item, told);
+                   warnOfUnusedValues(run.values, reading.parameters, item, told);
                  });
 }
 

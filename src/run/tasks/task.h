@@ -64,7 +64,7 @@ struct TaskContext {
   ParameterFields fields = {};
   /// The aggregate of the objective functions' values. May be empty.
   std::function<double(std::span<const double> objectiveValues)> aggregate = {};
-  Feasibility feasibility = {};  ///< which sets can be run, of a model with constraints
+  Feasibility feasibility = {};  ///< which sets can be run, of a model with constraints or equations
   /// Shows the user a warning that the log receives as well. May be empty.
   std::function<void(std::string_view)> warnUser = {};
 };

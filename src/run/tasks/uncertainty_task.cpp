@@ -26,6 +26,10 @@ std::vector<std::string> reportBands(const TaskContext& context, std::span<const
                         : fmt::format("Band of {}: {:.1f} % of {} observations lie between the 5 and the 95 % quantile",
                                       name, 100.0 * band.shareInside, band.observationCount));
     lines.push_back("   " + files.back().path);
+    if (const std::string fewer = fewerRunsText(band); !fewer.empty()) {
+      lines.push_back("   " + fewer);
+      context.log.warning(fmt::format("Band of {}: {}", name, fewer));
+    }
   }
   return lines;
 }
@@ -120,8 +124,8 @@ std::vector<ParameterSet> UncertaintyTask::drawSample(const TaskContext& context
   context.log.line(acceptance);
   if (rate < 1.0) {
     context.log.warning(
-        "The constraints leave less than 1 % of the sets drawn: the distributions of those that can be "
-        "run may have little in common with the ones requested. Are means and constraints right?");
+        "Less than 1 % of the sets drawn can be run: their distributions may have little in common with the ones "
+        "requested. Are means, standard deviations, constraints and equations right?");
   }
   return std::move(sample.sets);
 }

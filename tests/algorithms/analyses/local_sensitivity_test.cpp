@@ -94,20 +94,10 @@ TEST(PlanPerturbations, TakesTheOtherSideOfAConstraint) {
   const SearchSpace space = spaceOf({{kNone, 2, 0, 10}});
   // The largest and the least value that can be run; minus, plus and the warning, empty for none.
   const std::tuple<SensitivitySettings, double, double, double, double, std::string> cases[] = {
-      {{kForward, kOfRange, 0.1},
-       2.5,
-       0,
-       1,
-       2,
-       "the step up violates a constraint: the difference is that of the other"},
+      {{kForward, kOfRange, 0.1}, 2.5, 0, 1, 2, "the step up cannot be run: the difference is that of the other"},
       {{kForward, kOfRange, 0.1}, 10, 1.5, 2, 3, ""},
-      {{kCentral, kOfRange, 0.1}, 2.5, 0, 1, 2, "the step up violates a constraint: the difference is one-sided (no)"},
-      {{kCentral, kOfRange, 0.1},
-       10,
-       1.5,
-       2,
-       3,
-       "the step down violates a constraint: the difference is one-sided (no)"},
+      {{kCentral, kOfRange, 0.1}, 2.5, 0, 1, 2, "the step up cannot be run: the difference is one-sided (no)"},
+      {{kCentral, kOfRange, 0.1}, 10, 1.5, 2, 3, "the step down cannot be run: the difference is one-sided (no)"},
       {{kCentral, kOfRange, 0.1}, 2.5, 1.5, 1, 3, ""}};  // neither can be run, and both fail
   for (const auto& [settings, most, least, minus, plus, warning] : cases) {
     const auto feasibility = feasibleWhere([&](const auto& x) { return x[0] <= most && x[0] >= least; }, "no");

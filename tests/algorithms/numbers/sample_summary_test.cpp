@@ -73,6 +73,10 @@ TEST(SeriesBand, HasTheQuantilesOfWhatSucceededAndCountsTheObservationsInside) {
   EXPECT_TRUE(std::isnan(band.lower[3]) && std::isnan(band.median[3]) && std::isnan(band.upper[3]));
   EXPECT_DOUBLE_EQ(band.lower[4], -95.0);
   EXPECT_EQ(band.observationCount, 4U);
+  EXPECT_EQ(fewerRunsText(band),
+            "at 1 of 4 observations the quantiles are of fewer runs than at the others, of 100 to 101: runs have no "
+            "value there");
+  EXPECT_EQ(fewerRunsText(seriesBand(std::vector{5.0}, results, 1)), "");
   EXPECT_EQ(band.shareInside, 0.75);
   EXPECT_TRUE(std::isnan(seriesBand(std::vector{1.0}, {}, 0).shareInside));
 }

@@ -106,7 +106,7 @@ TEST(ProcessFolder, NeverCopiesWhatRunsMake) {
   std::istringstream madeByName(
       "in/deep/cal_Saved/1/out.csv cal_Saved/2/out.csv cal_Saved.12/3/out.csv cal_Optimisation.dat "
       "cal_Optimisation.3.dat cal.1_Sensitivity.dat cal_Band_2.csv cal_Band_2.1.csv cal_Report.html cal_Series.dat "
-      "cal_Series.dat.tmp calSimErr.dat.tmp cal._spi_ calSimErr.1.dat");
+      "cal_Series.dat.tmp cal_Report.html.4711.tmp calSimErr.dat.tmp cal._spi_ calSimErr.1.dat");
   // Folders without a batch log or a setup of their name, names that runs do not give, files by their content.
   std::istringstream ours(
       "run.sh my_Process1/data.txt cal_Processes/data.txt cal_Saved.old/data.txt my_Saved/data.txt cal_Failed/run.sh "

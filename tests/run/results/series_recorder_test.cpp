@@ -15,13 +15,14 @@ namespace {
 /// Records to `s_Series.dat` with a clock that the test sets; the period is the seconds 10 to 30.
 class SeriesRecorderTest : public ::testing::Test {
  protected:
-  SeriesRecorder recorder() {
+  SeriesRecorder recorder(bool keepsValues = false) {
     RecordedSeries run{.headLines = {"Title"},
                        .measures = {"flow"},
                        .observations = {{{10, 30}, {1.0F, 3.0F}}},
                        .periodFirst = 10,
                        .periodLast = 30,
                        .initialValues = {0.5}};
+    if (keepsValues) run.kept = {{1, {10, 30}}};
     return {folder_ / "s_Series.dat", std::move(run), [this] { return now_; },
             [this](std::string_view text) { warnings_.emplace_back(text); }};
   }
@@ -98,8 +99,11 @@ TEST_F(SeriesRecorderTest, FollowsTheSearchAndAggregatesThatComeLater) {
   run.finish(best_);
   EXPECT_EQ(numbers(), "1 7");
   best_ = BestEvaluation{8, 0.4, {8.0}};  // one whose series nobody has, until the final model run repeats it
+  EXPECT_THAT(warnings_, IsEmpty());
   run.finish(best_);
-  EXPECT_EQ(numbers(), "1 7");
+  EXPECT_EQ(numbers(), "1 8");
+  EXPECT_THAT(folder_.read("s_Series.dat"),
+              HasSubstr("# The series of the best evaluation, No. 8, are not in s_Series.dat: they were not kept\n"));
   evaluate(run, 20, 0.4, false, 8.0);
   run.finish(best_);
   EXPECT_EQ(numbers(), "1 8");
@@ -125,10 +129,14 @@ TEST_F(SeriesRecorderTest, GoesOnFromAnEarlierFileAndWarnsOnceWhereItCannotWrite
   run.finish(best_);
   EXPECT_EQ(numbers(), "1 3");
   SeriesRecorder withoutFile = recorder();
-  withoutFile.evaluationPassed(1, std::vector<double>{-1.0});
+  withoutFile.evaluationPassed({.number = 1}, std::vector<double>{-1.0}, std::nullopt);
   evaluate(withoutFile, 4, 2.0);
   withoutFile.finish(best_);
   EXPECT_FALSE(table().initial) << "a later evaluation is not the initial one";
+  EXPECT_THAT(warnings_,
+              ElementsAre("The series of the initial evaluation, No. 1, are not in s_Series.dat: they were not "
+                          "written yet when the run was interrupted"));
+  warnings_.clear();
 
   std::filesystem::remove(folder_ / "s_Series.dat");
   std::filesystem::create_directories(folder_ / "s_Series.dat/in the way");
@@ -137,6 +145,51 @@ TEST_F(SeriesRecorderTest, GoesOnFromAnEarlierFileAndWarnsOnceWhereItCannotWrite
   evaluate(run, 5, 1.0);
   run.finish(best_);
   EXPECT_EQ(warnings_.size(), 1U);
+}
+
+TEST_F(SeriesRecorderTest, OfAnEarlierRunShowsTheTrueBestFromWhatWasKeptOrSaysThatItIsNotThere) {
+  for (const bool isKept : {true, false}) {
+    {
+      SeriesRecorder killed = recorder();  // after its first write
+      evaluate(killed, 2, 5.0);
+    }
+    warnings_.clear();
+    SeriesRecorder run = recorder(isKept);
+    run.resume(table());
+    const BestEvaluation first{1, 6.0, {1.0}};
+    const BestEvaluation second{2, 5.0, {2.0}};
+    const BestEvaluation third{3, 4.0, {3.0}};
+    run.evaluationPassed({.number = 1, .aggregate = 6.0, .simulatedValues = {-1, 1.5, 1.5}}, first.parameterValues,
+                         first);
+    run.evaluationPassed({.number = 2, .aggregate = 5.0, .simulatedValues = {-1, 2.5, 2.5}}, second.parameterValues,
+                         second);
+    run.evaluationPassed({.number = 3, .aggregate = 4.0, .simulatedValues = {-1, 3.5, 3.7}}, third.parameterValues,
+                         third);
+    run.finish(third);
+    EXPECT_EQ(numbers(), isKept ? "1? 3" : "0? 3");
+    const auto gap = NanSensitiveFloatEq(std::nanf(""));
+    const ShownSeries shown = table().series.at(0);
+    if (isKept) {
+      EXPECT_THAT(shown.initial, ElementsAre(1.5F, 1.5F));
+      EXPECT_THAT(shown.best, ElementsAre(3.5F, 3.7F));
+    } else {
+      EXPECT_THAT(shown.best, ElementsAre(gap, gap));
+    }
+    const char* const said =
+        isKept ? "are there at the times of the observations alone" : "are not in s_Series.dat: they";
+    EXPECT_THAT(folder_.read("s_Series.dat"),
+                AllOf(HasSubstr(fmt::format("# The series of the initial evaluation, No. 1, {}", said)),
+                      HasSubstr(fmt::format("# The series of the best evaluation, No. 3, {}", said))));
+    EXPECT_EQ(warnings_.size(), isKept ? 0U : 2U);
+    // Continued again: what is not there is not taken for the best's.
+    warnings_.clear();
+    SeriesRecorder again = recorder(isKept);
+    again.resume(table());
+    again.finish(third);
+    EXPECT_EQ(warnings_.size(), isKept ? 0U : 1U);
+    std::filesystem::remove(folder_ / "s_Series.dat");
+    best_.reset();
+  }
 }
 
 }  // namespace

@@ -187,6 +187,8 @@ TEST_F(SetupReaderTest, EchoesEverySectionAndValueInReadingOrder) {
 }
 
 TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatAreSeldomMeant) {
+  folder_.write("same.txt", "Depth Rate\n200 0.5\n200 0.5\n");
+  folder_.write("steps.txt", "Depth Rate\n200 0.5\n200.5 0.5\n200 0.5\n");
   // warning: none where it is empty
   const std::pair<const char*, const char*> cases[] = {
       {"Weight_Above = 2.5 => Weigth_Abov = 2.5",
@@ -217,6 +219,23 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatAreSeldomMeant)
       {"Weight_Above = 2.5 => 0", ""},
       {"File_Name = 'gauge.csv' => File_Name = 'model/flow.csv'",
        "setup.kdx:64:16: Name: the observed series is in the file of the simulated one, which the model writes"},
+      {"File_Name = 'gauge.csv' => File_Name = 'setup_Saved/2/gauge.csv'",
+       "setup.kdx:64:16: Name: the observed series is in setup_Saved, which runs of this setup write, rename or "
+       "remove: "},
+      {"File_Name = 'gauge.csv' => File_Name = 'setup_Band_1.csv'",
+       "the observed series is in setup_Band_1.csv, which"},
+      {"File_Name = 'gauge.csv' => File_Name = 'setup_Band_x.csv'", ""},
+      {"Initial_Sample_File_Name = 'sample.txt' => 'same.txt'",
+       "Initial_Sample_File_Name: its 2 sets are the same: a search proposes nothing else among equal points"},
+      {"Initial_Sample_File_Name = 'sample.txt' => 'steps.txt' & Transformation_Type = 1 => 2 & "
+       "Initial_Value = 412.5 => 412",
+       "Initial_Sample_File_Name: 1 of the 3 values of the integer parameter \"Depth\" are not whole numbers of steps "
+       "above Lower_Bound = 100; of the first, 200.5, 200 is taken\n"},
+      {"Left_Equation = 'Rate' => '(Rate) < Depth' & Right_Equation = 'Depth' => '3'",
+       "setup.kdx:51:25: Left_Equation: the value of a comparison is 0 or 1, with which this constraint is always "
+       "met: "},
+      {"Left_Equation = 'Rate' => '1' & Right_Equation = 'Depth' => 'Rate < Depth'", ""},
+      {"Left_Equation = 'Rate' => '2 * (Rate < Depth)' & Right_Equation = 'Depth' => '3'", ""},
       {"Aggregation_Method = 0 => 3",
        "setup.kdx:60:26: Aggregation_Method: makes every aggregate 0: the search cannot tell one set from another"},
       {"Interface_Type = 0 => 1 & Aggregation_Method = 0 => Aggregation_Method = 0\nMinimum_Coverage = 0.5",
@@ -308,6 +327,24 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatAreSeldomMeant)
     const std::string log = logOf(edits);
     EXPECT_THAT(log, HasSubstr(warning));
     EXPECT_EQ(log.find("Warning") == std::string::npos, *warning == '\0') << edits;
+  }
+}
+
+TEST_F(SetupReaderTest, RefusesABaseFolderThatARunOfTheSetupRemoves) {
+  for (const std::string folder : {"setup_Failed12", "setup_Saved/3", "setup_Failed12x"}) {
+    std::string text = edited("'model\\run.sh' => 'model/run.sh'");
+    for (auto at = text.find("'model/"); at != std::string::npos; at = text.find("'model/")) {
+      text.replace(at, 6, "'" + folder);
+    }
+    for (const char* name : {"run.sh", "soil.par", "soil.tpl"}) {
+      folder_.write(folder + "/" + name, folder_.read(std::string("model/") + name));
+    }
+    const std::string refused = fmt::format(
+        "Error: The base folder {} lies in {}, which a run of this setup removes or "
+        "renames\nsetup.kdx:8:25: BatchFileName: expected a folder of your own",
+        folder, folder.substr(0, folder.find('/')));
+    const std::string failure = failureOf(text);
+    EXPECT_TRUE(folder.ends_with('x') ? failure.empty() : failure.starts_with(refused)) << failure;
   }
 }
 

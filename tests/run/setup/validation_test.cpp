@@ -46,6 +46,12 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
        "model/blank.tpl:1:1: expected"},
       {"'model/soil.tpl' => 'model/soil.par'", "The template file model/soil.par is a model parameter file, too",
        "overwrites"},
+      {"ParamFileName = 'model/soil.par' => 'model/run.sh'",
+       "The model parameter file model/run.sh is a batch file, too",
+       "setup.kdx:14:25: ParamFileName: expected another file, since each model run writes this one before its batch "
+       "starts; the other is setup.kdx:8:25: BatchFileName"},
+      {"File_Name = 'model/flow.csv' => 'model/soil.par'",
+       "The model parameter file model/soil.par is the file of a simulated series, too", "File_Name"},
       // Parameters
       {"TqSEKdxListItemCount = 3 => 0", "No model parameters defined", "setup.kdx:20:28"},
       {"Lower_Bound = 100 => 412.6", "Initial parameter value smaller than lower bound for parameter Depth",
@@ -138,6 +144,8 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
        "setup.kdx:29:29: Transformation_Type: expected 0 to 2, found 3"},
       {"Parameter_Type = 0 => -1", "Parameter type invalid for parameter Depth", ""},
       {"Logical_Operator = 1 => 4", "Invalid logical operator in CONSTRAINT_1", ""},
+      {"Logical_Operator = 1 => '=='", "Unable to read keyword in section CONSTRAINT_1 in KDX file",
+       "found the text \"==\"; what must be equal needs two constraints, '<=' and '>='"},
       {"Aggregation_Method = 0 => 4", "Objective function aggregation method invalid", ""},
       {"Interface_Type = 0 => 2", "Interface type invalid for output measure Flow error", ""},
       {"Statistic_Type = 1 => 5", "Statistic type invalid for output measure Flow error", ""},

@@ -96,10 +96,12 @@ TEST_F(TasksTest, MoreSetsThatCannotBeRunThanMayFailAreToldBeforeTheFirstModelRu
   run(scenarios);
   EXPECT_THAT(
       warnings_,
-      ElementsAre("Constraints are violated by 26 of 30 scenarios, which are not run and fail: No. 1, 2, 3, 4, 5, "
-                  "6, 7, 8, 9, 10, 11, 12, 13, 14, 15, 16, 17, 18, 19, 20 and 6 more\n"
-                  "   No. 1: constraint 1 (a < 5)\n"
-                  "   The run will end before it is complete: at most 3 may fail, a tenth of the 30 planned"));
+      ElementsAre(
+          "26 of 30 scenarios are not run and fail, as they violate a constraint or an equation has no finite value: "
+          "No. 1, 2, 3, 4, 5, "
+          "6, 7, 8, 9, 10, 11, 12, 13, 14, 15, 16, 17, 18, 19, 20 and 6 more\n"
+          "   No. 1: constraint 1 (a < 5)\n"
+          "   The run will end before it is complete: at most 3 may fail, a tenth of the 30 planned"));
 
   OptimisationTask optimisation;  // from initial values that violate it
   space_.initial[0] = 9.0;
@@ -108,7 +110,8 @@ TEST_F(TasksTest, MoreSetsThatCannotBeRunThanMayFailAreToldBeforeTheFirstModelRu
   evaluator_.batches.clear();
   run(optimisation);
   ASSERT_EQ(warnings_.size(), 2U);
-  EXPECT_THAT(warnings_[1], StartsWith("Constraints are violated by 1 of 1 given sets of the initial sample, "));
+  EXPECT_THAT(warnings_[1],
+              StartsWith("1 of 1 given sets of the initial sample is not run and fails, as it violates "));
 }
 
 TEST_F(TasksTest, AfterEverySearchItsBestSetIsTheFinalModelRun) {
