@@ -17,10 +17,12 @@
 #include "common/fatal_error.h"
 #include "common/file_copy.h"
 #include "common/files.h"
+#include "common/paths.h"
 #include "common/run_files.h"
 #include "common/text.h"
 #include "measures/measure_file.h"
 #include "parameters/read_template.h"
+#include "platform/processes/folder_room.h"
 #include "platform/processes/process_folder.h"
 
 namespace mirevo {
@@ -304,13 +306,16 @@ void ModelRunner::keepOutputFiles(int slot, int number, EvaluationResult& result
 void ModelRunner::keepFailedFolder(int slot, int number, std::vector<std::string>& warnings) const {
   const std::string folder = launcher_.getProcessFolder(slot);
   const std::string kept = fmt::format("{}{}", description_.failedFolderPrefix, number);
-  std::string reason;
+  std::string reason = whyNoRoom(folder, folderOf(kept), description_.runsAtOnce);
   try {
-    makeProcessFolder(folder, kept, processFolderPrefix_);
-    const std::string log = std::string("/") + run_files::kBatchLog;  // not part of the model, so not copied with it
-    struct stat status {};
-    const bool hasLog = ::stat((folder + log).c_str(), &status) == 0 || errno != ENOENT;
-    if (!hasLog || copyWhole(folder + log, kept + log, reason)) return;
+    if (reason.empty()) {
+      makeProcessFolder(folder, kept, processFolderPrefix_);
+      const std::string log = std::string("/") + run_files::kBatchLog;  // not part of the model, so not copied with it
+      struct stat status {};
+      const bool hasLog = ::stat((folder + log).c_str(), &status) == 0 || errno != ENOENT;
+      if (!hasLog || copyWhole(folder + log, kept + log, reason)) return;
+      removeIfPossible(kept);
+    }
   } catch (const FatalError& error) {
     reason = error.message();
   }

@@ -34,7 +34,8 @@ struct ModelDescription {
   std::vector<std::string> savedFiles;  ///< files kept from every model run
   std::string savedFolder;              ///< where they are kept
   std::string failedFolderPrefix;       ///< path of a failed run's folder, without the evaluation number that follows
-  bool keepSimulatedValues = false;     ///< results hold the simulated values at the observation times
+  int runsAtOnce = 1;                ///< model runs side by side, of all ranks, whose room on the disk is left to them
+  bool keepSimulatedValues = false;  ///< results hold the simulated values at the observation times
   SeriesPrecision keptPrecision = SeriesPrecision::single;
 };
 

@@ -290,6 +290,12 @@ TEST_F(LocalEvaluatorTest, TheFoldersOfTheFirstFailedRunsAreKept) {
   EXPECT_EQ(folder_.read("run_Failed3/mirevo_batch.log"), "why");
   EXPECT_THAT(folder_.read("run_Failed4/parameters.txt"), EndsWith(" 3\n"));
   EXPECT_FALSE(folder_.exists("run_Failed5"));
+
+  description_.runsAtOnce = 2'000'000'000;
+  earlier_.reset();
+  evaluate(makeEvaluator(launcher, 1, 100), {4.0});
+  EXPECT_FALSE(folder_.exists("run_Failed1")) << "no room for it";
+  EXPECT_THAT(observer_.events, Contains(HasSubstr("was not kept as " + (folder_ / "run_Failed1") + ": it needs ")));
 }
 
 }  // namespace

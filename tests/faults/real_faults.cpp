@@ -191,6 +191,38 @@ void tryFullDisk(bool isLong, FaultReport& report) {
   }
 }
 
+/// Failed runs whose folders are to be kept on a disk that has no room for them.
+void tryKeptFolders(bool isLong, FaultReport& report) {
+  const SmallDisk disk;
+  if (!disk.isThere()) {
+    report.skipped("kept folders", "no disk of its own can be mounted: " + disk.reason());
+    return;
+  }
+  constexpr std::uintmax_t kModelSize = 3'000'000;
+  constexpr int kBlocksOfMegabyte = 256;
+  ::setenv("TMPDIR", disk.path().c_str(), 1);
+  const auto run =
+      std::make_unique<FaultyRun>(RunSettings{.option = 3, .maxEvaluations = 60, .modelArguments = "--fail-above 5.8"});
+  ::unsetenv("TMPDIR");
+  run->folder().write("model/grid.bin", std::string(kModelSize, 'x'));
+  run->makeReference();
+  for (int room = 5; room <= 25; room += isLong ? 1 : 5) {
+    run->reset();
+    if (!disk.leave(room * kBlocksOfMegabyte, -1)) throw std::runtime_error(std::strerror(errno));
+    auto problems = run->check(run->run({}), {.mayPassSilently = true, .exitCode = 0});
+    disk.leave(-1, -1);
+    for (const auto& entry : fs::directory_iterator(run->path())) {
+      if (entry.path().filename().string().find("_Failed") == std::string::npos || !entry.is_directory()) continue;
+      std::error_code none;
+      const bool isWhole =
+          fs::exists(entry.path() / "mirevo_batch.log") && fs::file_size(entry.path() / "grid.bin", none) == kModelSize;
+      if (!isWhole) problems.push_back("half a copy: " + entry.path().string());
+    }
+    report.tried("kept folders", fmt::format("room for {} MB, of which the process folder takes 3", room), problems,
+                 run->checkNextRun());
+  }
+}
+
 /// The model itself removes, in its third run, what the program works with.
 void tryRemovedFiles(FaultReport& report) {
   // named: the message names it; null: the run does not need it any more
@@ -233,6 +265,7 @@ void tryRealFaults(bool isLong, FaultReport& report) {
   tryForbiddenFiles(report);
   tryLimits(isLong, report);
   tryRemovedFiles(report);
+  tryKeptFolders(isLong, report);
   tryFullDisk(isLong, report);
 }
 

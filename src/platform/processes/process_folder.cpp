@@ -257,6 +257,13 @@ void removeTree(const std::string& root) {
   }
 }
 
+void removeIfPossible(const std::string& root) {
+  try {
+    removeTree(root);
+  } catch (const FatalError&) {  // what is wrong with its disk or modes is told already
+  }
+}
+
 std::string processLockPath(std::string_view processFolderPrefix) {
   return std::string(processFolderPrefix).append(run_files::kProcessLock.extension);
 }
@@ -272,7 +279,12 @@ void makeProcessFolder(const std::string& source, const std::string& target, std
   const std::string why = whyNotReplaceable(target, run_files::kProcessFolder);
   if (!why.empty()) fatalError(fmt::format("{} has the name of a process folder. {}", target, why));
   removeTree(target);
-  FolderCopy(source, target, processFolderPrefix).copyAll();
+  try {
+    FolderCopy(source, target, processFolderPrefix).copyAll();
+  } catch (const FatalError&) {
+    removeIfPossible(target);
+    throw;
+  }
 }
 
 }  // namespace mirevo

@@ -85,8 +85,13 @@ void RunLog::write(std::string_view record) {
     return;
   }
   putBackIfRemoved(descriptor_, path_);  // if that fails, the log and the run go on all the same
-  const int error = writeWhole(descriptor_, record).error;
-  if (error != 0 && writeError_.empty()) writeError_ = std::strerror(error);
+  const int error = writeWhole(descriptor_, unwrittenHead_ + std::string(record)).error;
+  if (error == 0) {
+    unwrittenHead_.clear();
+    return;
+  }
+  if (writeError_.empty()) writeError_ = std::strerror(error);
+  if (unwrittenHead_.empty() && ::lseek(descriptor_, 0, SEEK_END) == 0) unwrittenHead_ = record;
 }
 
 }  // namespace mirevo

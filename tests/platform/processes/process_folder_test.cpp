@@ -1,10 +1,12 @@
 #include "platform/processes/process_folder.h"
 
+#include <csignal>
 #include <fcntl.h>
 #include <iterator>
 #include <map>
 #include <sstream>
 #include <string>
+#include <sys/resource.h>
 #include <sys/stat.h>
 #include <tuple>
 #include <unistd.h>
@@ -13,6 +15,8 @@
 #include <gtest/gtest.h>
 
 #include "common/run_files.h"
+#include "platform/processes/folder_room.h"
+#include "refusal.h"
 #include "temporary_folder.h"
 
 namespace mirevo {
@@ -87,6 +91,32 @@ TEST(ProcessFolder, LinksLeadWhereTheyShould) {
                                                         {"/dangling", "nowhere"},
                                                         {"/data/loop", "."}};
   for (const auto& [name, target] : cases) EXPECT_EQ(fs::read_symlink(copy + name).string(), target) << name;
+}
+
+TEST(ProcessFolder, WhatWasCopiedBeforeAFailureIsRemoved) {
+  const TemporaryFolder folder;
+  folder.write("base/a.txt", "a");
+  fs::create_symlink("a.txt", folder / "base/link");
+  folder.write("base/z.bin", std::string(100'000, 'z'));
+  const auto before = std::signal(SIGXFSZ, SIG_IGN);
+  rlimit limit{};
+  ::getrlimit(RLIMIT_FSIZE, &limit);
+  const rlimit small{50'000, limit.rlim_max};
+  ::setrlimit(RLIMIT_FSIZE, &small);
+  const std::string refusal =
+      refusalOf([&] { makeProcessFolder(folder / "base", folder / "run_Process1", folder / "run_Process"); });
+  ::setrlimit(RLIMIT_FSIZE, &limit);
+  std::signal(SIGXFSZ, before);
+  EXPECT_EQ(refusal, "Unable to write " + (folder / "run_Process1/z.bin") + ": File too large");
+  EXPECT_FALSE(folder.exists("run_Process1"));
+}
+
+TEST(ProcessFolder, ACopyLeavesRoomForTheModelRuns) {
+  const TemporaryFolder folder;
+  folder.write("base/in/run.sh", "");
+  EXPECT_EQ(extentOf(folder / "base").entries, 3U);
+  EXPECT_EQ(whyNoRoom(folder / "base", folder.path(), 1), "");
+  EXPECT_THAT(whyNoRoom(folder / "base", folder.path(), 2'000'000'000), testing::StartsWith("it needs 0.0 MB of the "));
 }
 
 // A setup that lies in the model's own folder has what its runs make in what it copies.
