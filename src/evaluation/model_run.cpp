@@ -23,6 +23,8 @@
 #include "measures/measure_file.h"
 #include "parameters/read_template.h"
 #include "platform/processes/folder_room.h"
+#include "platform/processes/leaving_links.h"
+#include "platform/processes/own_files.h"
 #include "platform/processes/process_folder.h"
 
 namespace mirevo {
@@ -111,7 +113,10 @@ ModelRunner::ModelRunner(ModelDescription description, ParameterModel& parameter
       processFolderPrefix_(launcherSettings.processFolderPrefix),
       shownRuns_(ToModelScale(parameters.searchSpace(), parameters.searchSpace().initial)) {
   requireFilesInBaseFolder();
-  const std::vector<std::string> converted = readTemplates();
+  LauncherSettings settings = launcherSettings;
+  settings.ownFiles = ownFiles();
+  warnings_ = requireOwnFiles(description_.baseFolder, settings.ownFiles);
+  readTemplates();
   series_ = SeriesTables::MirevoTSobjectInit(description_.measures, description_.period);
   shownMeasures_ = measuresOfDistinctPairs(description_.measures);
   savedFiles_ = SavedFiles(description_.savedFiles, description_.baseFolder, description_.savedFolder);
@@ -121,24 +126,48 @@ ModelRunner::ModelRunner(ModelDescription description, ParameterModel& parameter
     observedSeries_.push_back(
         readObservedSeries(i, measure, description_.period, description_.keptPrecision, series_.observation(i)));
   }
-  if (launcherSettings.slotCount > 0 && !launcher_.initialise(launcherSettings)) {
+  if (settings.slotCount > 0 && !launcher_.initialise(settings)) {
     fatalError("Error: Unable to initialise MirevoSimpleLaunch", launcher_.lastError());
   }
-  for (int slot = 1; slot <= launcherSettings.slotCount; ++slot) {
+  for (int slot = 1; slot <= settings.slotCount; ++slot) {
     SlotFiles& files = slots_.emplace_back();
-    for (std::size_t i = 0; i < description_.parameterFiles.size(); ++i) {
-      const ParameterFileItem& item = description_.parameterFiles[i];
+    for (const ParameterFileItem& item : description_.parameterFiles) {
       files.parameterFiles.push_back(slotPath(item.paramFileName, slot));
-      if (converted[i].empty()) continue;
-      // For inspection only; in the copies, since the base folder is never written to.
-      const std::string name = slotPath(item.templateFileName, slot) + description_.fileTag + ".tpl";
-      std::string reason;
-      if (!writeByUnlinkAndCreate(name, converted[i], 0666, reason))
-        fatalError("Error: Unable to open " + name, reason);
     }
+    writeConvertedTemplates(slot);
     for (const std::string& name : series_.simulationFileNames()) files.simulationFiles.push_back(slotPath(name, slot));
     if (!description_.measureFile.empty()) files.measureFile = slotPath(description_.measureFile, slot);
   }
+}
+
+/// For inspection only; in the copies, since the base folder is never written to.
+void ModelRunner::writeConvertedTemplates(int slot) const {
+  for (std::size_t i = 0; i < convertedTexts_.size(); ++i) {
+    const std::string& templateName = description_.parameterFiles[i].templateFileName;
+    // One behind a link that all slots share is not theirs to write beside.
+    const bool isShared =
+        findLeavingLink(launcher_.getProcessFolder(slot), folderOf(belowBase(templateName))).has_value();
+    if (convertedTexts_[i].empty() || isShared) continue;
+    const std::string name = slotPath(templateName, slot) + description_.fileTag + ".tpl";
+    std::string reason;
+    if (!writeByUnlinkAndCreate(name, convertedTexts_[i], 0666, reason))
+      fatalError("Error: Unable to open " + name, reason);
+  }
+}
+
+std::vector<std::string> ModelRunner::ownFiles() const {
+  std::vector<std::string> files;
+  for (const ParameterFileItem& item : description_.parameterFiles) files.push_back(belowBase(item.paramFileName));
+  for (const OutputMeasure& measure : description_.measures) {
+    if (measure.interfaceType == InterfaceType::timeSeries) files.push_back(belowBase(measure.simulation.fileName));
+  }
+  if (!description_.measureFile.empty()) files.push_back(belowBase(description_.measureFile));
+  for (const std::string& name : description_.savedFiles) files.push_back(belowBase(name));
+  return files;
+}
+
+std::string ModelRunner::belowBase(const std::string& file) const {
+  return std::string(trimTrailing(file).substr(description_.baseFolder.size()));
 }
 
 void ModelRunner::requireFilesInBaseFolder() const {
@@ -162,16 +191,14 @@ void ModelRunner::requireFilesInBaseFolder() const {
   }
 }
 
-std::vector<std::string> ModelRunner::readTemplates() {
-  std::vector<std::string> converted;
+void ModelRunner::readTemplates() {
   const std::vector<ModelParameter>& parameters = parameters_.parameters();
   for (const ParameterFileItem& item : description_.parameterFiles) {
     ReadTemplate read = readTemplate(item, parameters);
     templates_.push_back(std::move(read.filled));
-    templateWarnings_.insert(templateWarnings_.end(), read.doubts.begin(), read.doubts.end());
-    converted.push_back(std::move(read.converted));
+    warnings_.insert(warnings_.end(), read.doubts.begin(), read.doubts.end());
+    convertedTexts_.push_back(std::move(read.converted));
   }
-  return converted;
 }
 
 EqualMeasures ModelRunner::equalMeasures() const {
@@ -201,7 +228,7 @@ InitialPairs ModelRunner::initialPairs() const {
 }
 
 std::string ModelRunner::slotPath(const std::string& baseFile, int slot) const {
-  return launcher_.getProcessFolder(slot) + std::string(trimTrailing(baseFile).substr(description_.baseFolder.size()));
+  return launcher_.getProcessFolder(slot) + belowBase(baseFile);
 }
 
 std::optional<EvaluationFailure> ModelRunner::findUnwritable(std::span<const double> modelValues) const {
@@ -346,7 +373,12 @@ std::optional<EvaluationFailure> ModelRunner::findMissingResults(int slot) const
   if (!files.measureFile.empty()) wanted.push_back(files.measureFile);
   for (const std::string& path : wanted) {
     struct stat status {};
-    if (::stat(path.c_str(), &status) == 0) continue;
+    if (::stat(path.c_str(), &status) == 0) {
+      const std::string folder = launcher_.getProcessFolder(slot);
+      const auto link = findLeavingLink(folder, std::string_view(path).substr(folder.size()));
+      if (!link) continue;
+      return makeFailure(Kind::resultsNotReadable, fmt::format("{}: {}", path, describe(*link)), slot);
+    }
     if (errno == ENOENT || errno == ENOTDIR) {
       return makeFailure(Kind::resultsNotWritten, "the batch ended well but did not write " + path, slot);
     }

@@ -86,8 +86,8 @@ class ModelRunner final {
   EqualMeasures equalMeasures() const;
   /// A comparison of the pairs of model runs, for the evaluations of a run.
   InitialPairs initialPairs() const;
-  /// templateDoubts() of all templates.
-  const std::vector<std::string>& templateWarnings() const { return templateWarnings_; }
+  /// What the user should know of links in the model's folder, and templateDoubts() of all templates.
+  const std::vector<std::string>& warnings() const { return warnings_; }
 
  private:
   /// Paths of one slot's copies of the model's files.
@@ -97,11 +97,15 @@ class ModelRunner final {
     std::string measureFile;                   ///< empty when there is none
   };
 
+  /// The files that must be each slot's own, below the base folder with their leading "/".
+  std::vector<std::string> ownFiles() const;
   void requireFilesInBaseFolder() const;
-  /// Returns one text per parameter file: that of a converted numeric-ID template, empty for the others.
-  std::vector<std::string> readTemplates();
+  void writeConvertedTemplates(int slot) const;
+  void readTemplates();
   /// The failure of a set with a value that a template has no form for; empty when all can be written.
   std::optional<EvaluationFailure> findUnwritable(std::span<const double> modelValues) const;
+  /// The part of a path in the base folder that follows it, with its leading "/".
+  std::string belowBase(const std::string& file) const;
   std::string slotPath(const std::string& baseFile, int slot) const;
   void updateResistanceNumbers(const std::string& path);
   EvaluationResult judge(int slot);
@@ -121,7 +125,8 @@ class ModelRunner final {
   ProcessLauncher& launcher_;
   std::string processFolderPrefix_;
   std::vector<ParameterTemplate> templates_;  ///< one per parameter file
-  std::vector<std::string> templateWarnings_;
+  std::vector<std::string> convertedTexts_;   ///< one per parameter file: that of a converted numeric-ID template
+  std::vector<std::string> warnings_;
   SeriesTables series_;
   SavedFiles savedFiles_;
   std::vector<ObservedSeries> observedSeries_;

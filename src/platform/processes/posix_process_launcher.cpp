@@ -28,6 +28,7 @@
 #include "common/run_files.h"
 #include "common/text.h"
 #include "platform/processes/argument_text.h"
+#include "platform/processes/own_files.h"
 #include "platform/processes/process_folder.h"
 
 namespace mirevo {
@@ -105,6 +106,10 @@ std::string printable(std::string_view line) {
   return std::string(trimTrailing(text));
 }
 
+std::string textOf(const FatalError& error) {
+  return error.detail().empty() ? error.message() : error.message() + "\n" + error.detail();
+}
+
 /// What a shell tells with its own codes (POSIX.1-2017, 2.8.2).
 std::string_view meaningOfCode(int status) {
   if (status == 127) return " (a shell: command not found)";
@@ -136,6 +141,9 @@ bool PosixProcessLauncher::initialise(const LauncherSettings& settings) {
   ::signal(SIGCHLD, SIG_DFL);
   graceSeconds_ = settings.graceSeconds;
   maxSeconds_ = settings.maxSeconds;
+  baseFolder_ = settings.baseFolder;
+  processFolderPrefix_ = settings.processFolderPrefix;
+  ownFiles_ = settings.ownFiles;
   try {
     std::vector<std::vector<std::string>> arguments;
     for (const BatchItem& item : settings.batchItems) {
@@ -163,7 +171,7 @@ bool PosixProcessLauncher::initialise(const LauncherSettings& settings) {
       prepareSlot(settings, number, arguments);
     }
   } catch (const FatalError& error) {
-    lastError_ = error.message();
+    lastError_ = textOf(error);
     return false;
   } catch (const std::bad_alloc&) {
     lastError_ = std::strerror(ENOMEM);
@@ -198,7 +206,8 @@ void PosixProcessLauncher::prepareSlot(const LauncherSettings& settings, int num
     fatalError(fmt::format("The model's folder {} lies in the process folder {}, which is made anew for every run",
                            settings.baseFolder, slot.folder));
   }
-  makeProcessFolder(settings.baseFolder, slot.folder, settings.processFolderPrefix);
+  makeProcessFolder(baseFolder_, slot.folder, processFolderPrefix_);
+  makeFilesOwn(slot.folder, baseFolder_, ownFiles_, processFolderPrefix_);
   if (!renewLog(slot)) {
     fatalError(fmt::format("Unable to create {}/{}: {}", slot.folder, run_files::kBatchLog, std::strerror(errno)));
   }

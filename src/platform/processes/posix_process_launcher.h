@@ -74,6 +74,9 @@ class PosixProcessLauncher final : public ProcessLauncher {
   std::atomic<pid_t>& groupEntry(const Slot& slot) const;
 
   std::string lastError_;
+  std::string baseFolder_;
+  std::string processFolderPrefix_;
+  std::vector<std::string> ownFiles_;
   FileLock lock_;  ///< on the process folders
   MonotonicClock clock_;
   double graceSeconds_ = 0.0;

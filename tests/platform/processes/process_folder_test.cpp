@@ -80,6 +80,9 @@ TEST(ProcessFolder, LinksLeadWhereTheyShould) {
   fs::create_symlink(folder / "setup/model/shared/y.txt", base + "/outside_absolute");
   fs::create_symlink("nowhere", base + "/dangling");
   fs::create_symlink(".", base + "/data/loop");
+  fs::create_symlink("../../base/data", base + "/data/around");
+  fs::create_directory_symlink(base, folder / "way");
+  fs::create_symlink(folder / "way/data", base + "/spelt_otherwise");
 
   const std::string copy = folder / "setup/run_Process1";
   makeProcessFolder(base, copy, folder / "setup/run_Process");
@@ -89,7 +92,9 @@ TEST(ProcessFolder, LinksLeadWhereTheyShould) {
                                                         {"/outside_relative", folder / "setup/model/shared/y.txt"},
                                                         {"/outside_absolute", folder / "setup/model/shared/y.txt"},
                                                         {"/dangling", "nowhere"},
-                                                        {"/data/loop", "."}};
+                                                        {"/data/loop", "."},
+                                                        {"/data/around", copy + "/data"},
+                                                        {"/spelt_otherwise", copy + "/data"}};
   for (const auto& [name, target] : cases) EXPECT_EQ(fs::read_symlink(copy + name).string(), target) << name;
 }
 
