@@ -114,7 +114,8 @@ ModelRunner::ModelRunner(ModelDescription description, ParameterModel& parameter
       shownRuns_(ToModelScale(parameters.searchSpace(), parameters.searchSpace().initial)) {
   requireFilesInBaseFolder();
   LauncherSettings settings = launcherSettings;
-  settings.ownFiles = ownFiles();
+  needs_ = folderNeeds(settings);
+  settings.ownFiles = needs_.ownFiles();
   warnings_ = requireOwnFiles(description_.baseFolder, settings.ownFiles);
   readTemplates();
   series_ = SeriesTables::MirevoTSobjectInit(description_.measures, description_.period);
@@ -155,15 +156,20 @@ void ModelRunner::writeConvertedTemplates(int slot) const {
   }
 }
 
-std::vector<std::string> ModelRunner::ownFiles() const {
-  std::vector<std::string> files;
-  for (const ParameterFileItem& item : description_.parameterFiles) files.push_back(belowBase(item.paramFileName));
-  for (const OutputMeasure& measure : description_.measures) {
-    if (measure.interfaceType == InterfaceType::timeSeries) files.push_back(belowBase(measure.simulation.fileName));
+FolderNeeds ModelRunner::folderNeeds(const LauncherSettings& settings) const {
+  FolderNeeds needs;
+  needs.baseFolder = description_.baseFolder;
+  for (const ParameterFileItem& item : description_.parameterFiles) {
+    needs.parameterFiles.push_back(belowBase(item.paramFileName));
   }
-  if (!description_.measureFile.empty()) files.push_back(belowBase(description_.measureFile));
-  for (const std::string& name : description_.savedFiles) files.push_back(belowBase(name));
-  return files;
+  for (const OutputMeasure& measure : description_.measures) {
+    if (measure.interfaceType == InterfaceType::timeSeries)
+      needs.outputs.push_back(belowBase(measure.simulation.fileName));
+  }
+  if (!description_.measureFile.empty()) needs.outputs.push_back(belowBase(description_.measureFile));
+  for (const std::string& name : description_.savedFiles) needs.savedFiles.push_back(belowBase(name));
+  for (const BatchItem& item : settings.batchItems) needs.batchFiles.push_back(belowBase(item.batchFileName));
+  return needs;
 }
 
 std::string ModelRunner::belowBase(const std::string& file) const {
@@ -245,12 +251,35 @@ std::optional<EvaluationFailure> ModelRunner::findUnrunnable(std::span<const dou
   return findUnwritable(std::get<std::span<const double>>(mapped));
 }
 
+std::optional<FolderDamage> ModelRunner::renewIfDamaged(int slot, std::vector<std::string>& warnings) {
+  SlotFiles& files = slots_.at(static_cast<std::size_t>(slot - 1));
+  if (!files.isUsed) return std::nullopt;
+  const std::string folder = launcher_.getProcessFolder(slot);
+  auto damage = findDamage(folder, needs_);
+  if (!damage) {
+    files.isRenewed = false;
+    return std::nullopt;
+  }
+  if (files.isRenewed) return damage;
+  if (!launcher_.renewFolder(slot)) {
+    damage->why += fmt::format("; the process folder could not be made anew: {}", launcher_.lastError());
+    return damage;
+  }
+  writeConvertedTemplates(slot);
+  files.isUsed = false;
+  files.isRenewed = true;
+  warnings.push_back(
+      fmt::format("The process folder {} was made anew, as the model had damaged it. {}", folder, damage->text()));
+  return std::nullopt;
+}
+
 std::optional<EvaluationFailure> ModelRunner::prepareModelRun(std::span<const double> set, int slot) {
   const auto mapped = parameters_.MapToModelValues(set);
   if (const auto* failure = std::get_if<ParameterFailure>(&mapped)) return parameterFailure(*failure);
   const auto modelValues = std::get<std::span<const double>>(mapped);
   if (auto failure = findUnwritable(modelValues)) return failure;
-  const SlotFiles& files = slots_.at(static_cast<std::size_t>(slot - 1));
+  SlotFiles& files = slots_.at(static_cast<std::size_t>(slot - 1));
+  files.isUsed = true;
   // Files of an earlier run must never be taken for results of this one.
   for (const std::string& path : files.simulationFiles) removeFile(path);
   if (!files.measureFile.empty()) removeFile(files.measureFile);

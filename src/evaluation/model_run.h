@@ -3,10 +3,12 @@
 #include <optional>
 #include <span>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "evaluation/equal_measures.h"
 #include "evaluation/evaluation_result.h"
+#include "evaluation/folder_damage.h"
 #include "evaluation/initial_pairs.h"
 #include "evaluation/saved_files.h"
 #include "evaluation/shown_runs.h"
@@ -55,6 +57,11 @@ class ModelRunner final {
   /// From now on a model run with less than the least share of these pairs is a failed evaluation.
   void requirePairs(RequiredPairs required) { requiredPairs_ = std::move(required); }
 
+  /// To be called before a model run in the slot: if the run before it has damaged the process folder, makes that anew,
+  /// with a line in `warnings`. Returns why the slot cannot be used any more: this failed, or the run in the folder
+  /// that was made anew has damaged it again. Empty if it can.
+  std::optional<FolderDamage> renewIfDamaged(int slot, std::vector<std::string>& warnings);
+
   /// Builds the full parameter vector, removes the results of the slot's last run, writes the parameter files and
   /// starts the batch; or returns why the set is not run. Throws FatalError when a file cannot be removed or written.
   std::optional<EvaluationFailure> prepareModelRun(std::span<const double> set, int slot);
@@ -95,10 +102,11 @@ class ModelRunner final {
     std::vector<std::string> parameterFiles;   ///< in the order of ModelDescription::parameterFiles
     std::vector<std::string> simulationFiles;  ///< in the order of SeriesTables::simulationFileNames()
     std::string measureFile;                   ///< empty when there is none
+    bool isUsed = false;                       ///< a model has run in the folder
+    bool isRenewed = false;                    ///< it was made anew, and no run has left it whole since
   };
 
-  /// The files that must be each slot's own, below the base folder with their leading "/".
-  std::vector<std::string> ownFiles() const;
+  FolderNeeds folderNeeds(const LauncherSettings& settings) const;
   void requireFilesInBaseFolder() const;
   void writeConvertedTemplates(int slot) const;
   void readTemplates();
@@ -124,6 +132,7 @@ class ModelRunner final {
   ObjectiveAggregator& aggregator_;
   ProcessLauncher& launcher_;
   std::string processFolderPrefix_;
+  FolderNeeds needs_;
   std::vector<ParameterTemplate> templates_;  ///< one per parameter file
   std::vector<std::string> convertedTexts_;   ///< one per parameter file: that of a converted numeric-ID template
   std::vector<std::string> warnings_;

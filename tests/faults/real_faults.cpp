@@ -223,6 +223,36 @@ void tryKeptFolders(bool isLong, FaultReport& report) {
   }
 }
 
+/// A model that leaves its process folder unusable, in the second of two slots or in both.
+void tryDamagedFolders(FaultReport& report) {
+  // what it does, the slots, what the log says
+  constexpr std::tuple<const char*, const char*, const char*> kCases[] = {
+      {"rm -rf \"$PWD\"", "2", "Slot 2 is given up"},
+      {"rm -rf \"$PWD\" && ln -s {} \"$PWD\"", "2", "Slot 2 is given up"},
+      {"rm -f simulated.csv; mkdir simulated.csv simulated.csv/x", "2", "Slot 2 is given up"},
+      {"rm run.sh", "2", "Slot 2 is given up"},
+      {"rm parameters.txt; mkdir parameters.txt", "2", "Slot 2 is given up"},
+      {"rm parameters.txt", "?", "no process folder is left"},
+      {"mv simulated.csv {0}; ln -s {0}/simulated.csv .", "2", "leads to"}};
+  for (const auto& [damage, slots, told] : kCases) {
+    const TemporaryFolder outside;
+    const std::string command = fmt::format(fmt::runtime(damage), outside.path());
+    FaultyRun run(RunSettings{.option = 3, .maxEvaluations = 30, .slots = 2},
+                  fmt::format("{0} \"$@\" || exit 1\n"
+                              "test -e {1}/armed && case $PWD in *_Process{2}) {3};; esac\n"
+                              "exit 0",
+                              MIREVO_TEST_MODEL, outside.path(), slots, command));
+    run.makeReference();
+    outside.write("armed", "");
+    run.reset();
+    const bool isFatal = std::string(told) != "Slot 2 is given up";
+    const auto problems =
+        run.check(run.run({}), {.names = {told}, .mayFailEvaluation = true, .exitCode = isFatal ? 1 : 0});
+    fs::remove(outside / "armed");
+    report.tried("damaged folders", command + " in slot " + slots, problems, run.checkNextRun());
+  }
+}
+
 /// The model itself removes, in its third run, what the program works with.
 void tryRemovedFiles(FaultReport& report) {
   // named: the message names it; null: the run does not need it any more
@@ -233,8 +263,8 @@ void tryRemovedFiles(FaultReport& report) {
       {"basin._spi_", nullptr, ""},
       {"basin_Saved", nullptr, ""},
       {"basin_Process1", "basin_Process1/simulated.csv", ""},
-      {"basin_Process1/parameters.txt", "basin_Process1/parameters.txt", "No such file"},
-      {"basin_Process1/run.sh", "run.sh", "No such file or directory"},
+      {"basin_Process1/parameters.txt", nullptr, ""},
+      {"basin_Process1/run.sh", nullptr, ""},
       {"basin_Optimisation.dat", nullptr, ""},
       {"basin.log", nullptr, ""}};
   for (const auto& [removed, named, reason] : kCases) {
@@ -265,6 +295,7 @@ void tryRealFaults(bool isLong, FaultReport& report) {
   tryForbiddenFiles(report);
   tryLimits(isLong, report);
   tryRemovedFiles(report);
+  tryDamagedFolders(report);
   tryKeptFolders(isLong, report);
   tryFullDisk(isLong, report);
 }

@@ -236,6 +236,18 @@ void PosixProcessLauncher::prepareEnvironment(bool useSingleThread) {
   environment_.push_back(nullptr);
 }
 
+bool PosixProcessLauncher::renewFolder(int slotNumber) {
+  const std::string& folder = slotAt(slotNumber).folder;
+  try {
+    makeProcessFolderAnew(baseFolder_, folder, processFolderPrefix_);
+    makeFilesOwn(folder, baseFolder_, ownFiles_, processFolderPrefix_);
+  } catch (const FatalError& error) {
+    lastError_ = textOf(error);
+    return false;
+  }
+  return true;
+}
+
 std::string PosixProcessLauncher::getProcessFolder(int slot) const {
   return slotAt(slot).folder;
 }

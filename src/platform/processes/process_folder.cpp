@@ -312,6 +312,10 @@ void copyFolder(const std::string& source, const std::string& target, std::strin
 void makeProcessFolder(const std::string& source, const std::string& target, std::string_view processFolderPrefix) {
   const std::string why = whyNotReplaceable(target, run_files::kProcessFolder);
   if (!why.empty()) fatalError(fmt::format("{} has the name of a process folder. {}", target, why));
+  makeProcessFolderAnew(source, target, processFolderPrefix);
+}
+
+void makeProcessFolderAnew(const std::string& source, const std::string& target, std::string_view processFolderPrefix) {
   removeTree(target);
   try {
     FolderCopy(source, target, processFolderPrefix, true).copyAll();

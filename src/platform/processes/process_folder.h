@@ -31,6 +31,9 @@ void removeIfPossible(const std::string& root);
 /// Throws FatalError with a line that names the path and the system's reason.
 void makeProcessFolder(const std::string& source, const std::string& target, std::string_view processFolderPrefix);
 
+/// The same without a look at what `target` is: for a process folder of this run, whatever a model has made of it.
+void makeProcessFolderAnew(const std::string& source, const std::string& target, std::string_view processFolderPrefix);
+
 /// Copies the folder `source` in the same way to `target`, where nothing is, and without the mark.
 void copyFolder(const std::string& source, const std::string& target, std::string_view processFolderPrefix);
 

@@ -64,6 +64,10 @@ class ProcessLauncher {
   virtual bool initialise(const LauncherSettings& settings) = 0;
   virtual const std::string& lastError() const = 0;
 
+  /// Makes the process folder of a slot that runs nothing once more such a copy, whatever has become of it. False when
+  /// that fails; lastError() says why.
+  virtual bool renewFolder(int slot) = 0;
+
   /// Absolute path of the slot's folder, without a trailing separator.
   virtual std::string getProcessFolder(int slot) const = 0;
 
