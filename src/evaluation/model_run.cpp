@@ -130,6 +130,11 @@ ModelRunner::ModelRunner(ModelDescription description, ParameterModel& parameter
   if (settings.slotCount > 0 && !launcher_.initialise(settings)) {
     fatalError("Error: Unable to initialise MirevoSimpleLaunch", launcher_.lastError());
   }
+  if (settings.slotCount > 0 && settings.firstFolderNumber == 1 && description_.runsAtOnce > 1) {
+    const std::vector<std::string> own{description_.baseFolder, folderOf(processFolderPrefix_),
+                                       folderOf(description_.savedFolder)};
+    sharedTargets_ = SharedTargets(launcher_.getProcessFolder(1), own);
+  }
   for (int slot = 1; slot <= settings.slotCount; ++slot) {
     SlotFiles& files = slots_.emplace_back();
     for (const ParameterFileItem& item : description_.parameterFiles) {
@@ -304,6 +309,7 @@ void ModelRunner::updateResistanceNumbers(const std::string& path) {
 
 EvaluationResult ModelRunner::collect(int slot) {
   EvaluationResult result = judge(slot);
+  for (std::string& line : sharedTargets_.takeChanged()) result.warnings.push_back(std::move(line));
   if (result.ok() && shownRuns_.mayBeShown(slot, result.aggregate)) {
     for (const std::size_t i : shownMeasures_) {
       result.shownSeries.push_back(

@@ -20,6 +20,7 @@
 #include "parameters/parameter_model.h"
 #include "parameters/template_file.h"
 #include "platform/processes/process_launcher.h"
+#include "platform/processes/shared_targets.h"
 
 namespace mirevo {
 
@@ -138,6 +139,7 @@ class ModelRunner final {
   std::vector<std::string> warnings_;
   SeriesTables series_;
   SavedFiles savedFiles_;
+  SharedTargets sharedTargets_;  ///< looked at again after the first model run
   std::vector<ObservedSeries> observedSeries_;
   std::vector<std::size_t> shownMeasures_;
   ShownRuns shownRuns_;

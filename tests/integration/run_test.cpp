@@ -110,8 +110,10 @@ TEST(Optimisation, ResultsAreTheSameBitsWhateverOrderTheModelRunsEndIn) {
 
 TEST(Optimisation, SlotsDoNotShareWhatALinkInTheModelsFolderLeadsTo) {
   const ModelFolder folder;
-  folder.useScript("cd out && cp ../parameters.txt . && " + std::string(kSleepByParameters));
+  folder.useScript("cd out && cp ../parameters.txt . && date >../work/$$ && " + std::string(kSleepByParameters));
   folder.write("model/out/simulated.csv", folder.read("observed.csv"));
+  std::filesystem::create_directory(folder / "work");
+  std::filesystem::create_directory_symlink("../work", folder / "model/work");
   folder.writeSetup({.algorithm = 1, .maxEvaluations = 40, .slots = 4});
   folder.editSetup("model/simulated.csv", "model/out/simulated.csv");
   const auto run = [&folder] {
@@ -125,7 +127,8 @@ TEST(Optimisation, SlotsDoNotShareWhatALinkInTheModelsFolderLeadsTo) {
   EXPECT_EQ(run(), wanted);
   EXPECT_EQ(folder.read("scratch/simulated.csv"), folder.read("observed.csv"));
   EXPECT_FALSE(folder.exists("scratch/parameters.txt"));
-  EXPECT_THAT(folder.read("basin.log"), HasSubstr("\nWarning: The link " + (folder / "model/out") + " leads to "));
+  EXPECT_THAT(folder.read("basin.log"), AllOf(HasSubstr("\nWarning: The link " + (folder / "model/out") + " leads to "),
+                                              HasSubstr(": " + (folder / "work") + " was changed during the first")));
 }
 
 TEST(Scenarios, ASingleRunEvaluatesTheInitialSet) {
