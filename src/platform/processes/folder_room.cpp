@@ -21,11 +21,9 @@ std::string megabytes(std::uintmax_t bytes) {
 
 }  // namespace
 
-FolderExtent extentOf(const std::string& folder, const FolderExtent& most) {
+FolderExtent extentOf(const std::string& folder, std::error_code& failed, const FolderExtent& most) {
   FolderExtent extent{kBlock, 1};
-  std::error_code failed;
-  const fs::directory_options options = fs::directory_options::skip_permission_denied;
-  fs::recursive_directory_iterator entry(folder, options, failed);
+  fs::recursive_directory_iterator entry(folder, failed);
   for (; !failed && entry != fs::recursive_directory_iterator(); entry.increment(failed)) {
     std::error_code ignored;
     const bool isFile = entry->symlink_status(ignored).type() == fs::file_type::regular;
@@ -40,7 +38,9 @@ FolderExtent extentOf(const std::string& folder, const FolderExtent& most) {
 std::string whyNoRoom(const std::string& source, const std::string& where, int runs) {
   struct statvfs disk {};
   if (::statvfs(where.c_str(), &disk) != 0) return {};
-  const FolderExtent copy = extentOf(source);
+  std::error_code failed;
+  const FolderExtent copy = extentOf(source, failed);
+  if (failed) return fmt::format("Unable to read the folder {}: {}", source, failed.message());
   const auto shares = static_cast<std::uintmax_t>(runs);
   const FolderExtent left{shares * copy.bytes + kForResults.bytes, shares * copy.entries + kForResults.entries};
   if (const std::uintmax_t free = std::uintmax_t{disk.f_bavail} * disk.f_frsize; copy.bytes + left.bytes > free) {

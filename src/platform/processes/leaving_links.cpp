@@ -48,6 +48,7 @@ std::string resolvedPath(const std::string& path) {
 }
 
 std::string describe(const LeavingLink& link) {
+  if (!link.fault.empty()) return fmt::format("the link {} cannot be read: {}", link.link, link.fault);
   return fmt::format(
       "the link {} leads to {}, out of the process folder, where other model runs may write the same file; let the "
       "model write into its own folder",
@@ -61,9 +62,13 @@ std::optional<LeavingLink> findLeavingLink(const std::string& folder, std::strin
   for (auto part = below.begin(); part != below.end(); ++part) {
     at /= *part;
     if (!isLink(at)) continue;
+    const bool isForFolder = std::next(part) != below.end();
+    std::error_code failed;
+    static_cast<void>(fs::read_symlink(at, failed));
+    if (failed) return LeavingLink{at.string(), {}, isForFolder, failed.message()};
     std::string target = resolvedPath(nextOf(at).string());
     if (!pathInFolder(target, root)) {
-      return LeavingLink{lastLinkIn(root, at).string(), std::move(target), std::next(part) != below.end()};
+      return LeavingLink{lastLinkIn(root, at).string(), std::move(target), isForFolder};
     }
     at = std::move(target);
   }

@@ -11,6 +11,7 @@ struct LeavingLink {
   std::string link;          ///< absolute path; of several that lead to one another the last one in the folder
   std::string target;        ///< where it leads in the end; absolute, without links
   bool isForFolder = false;  ///< the path goes on behind it
+  std::string fault = {};  ///< the system's reason if the link cannot be read; it is then taken for one that leads out
 };
 
 /// The first link on the way from `folder` to `path`, a path below it with its leading "/", that leads out of the

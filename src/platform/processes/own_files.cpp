@@ -39,6 +39,7 @@ constexpr int kMostLinks = 40;
 /// The type of what the link leads to; refuses what cannot be copied.
 fs::file_type requireCopyable(const std::string& file, const LeavingLink& link,
                               std::initializer_list<const std::string*> folders) {
+  if (!link.fault.empty()) fatalError("Error: Unable to read the link " + link.link, link.fault);
   std::error_code failed;
   const fs::file_type type = fs::status(link.target, failed).type();
   switch (type) {
@@ -52,7 +53,11 @@ fs::file_type requireCopyable(const std::string& file, const LeavingLink& link,
         if (!pathInFolder(resolvedPath(*folder), link.target)) continue;
         refuse(file, link, fmt::format("it cannot be copied, as {} is in it", *folder));
       }
-      if (!extentOf(link.target, kMostCopied).exceeds(kMostCopied)) return type;
+      if (const FolderExtent extent = extentOf(link.target, failed, kMostCopied); failed) {
+        refuse(file, link, failed.message());
+      } else if (!extent.exceeds(kMostCopied)) {
+        return type;
+      }
       refuse(file, link,
              fmt::format("it is too large to be copied for each of them: more than {} MB or {} files",
                          kMostCopied.bytes / 1'000'000, kMostCopied.entries));

@@ -21,14 +21,16 @@ namespace fs = std::filesystem;
 constexpr int kMostEntries = 5000;
 constexpr std::size_t kMostLinks = 100;
 
-/// Calls `visit` with the paths in a folder, not through links, until there are no more or too many.
-void visitEntries(const std::string& folder, const std::function<void(const fs::directory_entry&)>& visit) {
+/// Calls `visit` with the paths in a folder, not through links, until there are no more or too many. Returns the reason
+/// why it ended before, if it did.
+std::error_code visitEntries(const std::string& folder, const std::function<void(const fs::directory_entry&)>& visit) {
   std::error_code failed;
   fs::recursive_directory_iterator entry(folder, fs::directory_options::skip_permission_denied, failed);
   for (int i = 0; i < kMostEntries && !failed && entry != fs::recursive_directory_iterator(); ++i) {
     visit(*entry);
     entry.increment(failed);
   }
+  return failed;
 }
 
 std::uint64_t stateOfEntry(const std::string& path) {
@@ -50,12 +52,13 @@ std::uint64_t stateOf(const std::string& path) {
 
 SharedTargets::SharedTargets(const std::string& folder, std::span<const std::string> own) {
   const std::string root = resolvedPath(folder);
-  visitEntries(root, [&](const fs::directory_entry& entry) {
+  const std::error_code failed = visitEntries(root, [&](const fs::directory_entry& entry) {
     std::error_code ignored;
     if (targets_.size() == kMostLinks || !entry.is_symlink(ignored)) return;
     const std::string path = entry.path().string();
     auto link = findLeavingLink(root, std::string_view(path).substr(root.size()));
-    if (!link || link->link != path) return;
+    if (link && !link->fault.empty()) problems_.push_back(describe(*link));
+    if (!link || link->link != path || !link->fault.empty()) return;
     const auto contains = [&link](const std::string& each) {
       return pathInFolder(resolvedPath(each), link->target).has_value();
     };
@@ -63,10 +66,11 @@ SharedTargets::SharedTargets(const std::string& folder, std::span<const std::str
     const std::uint64_t state = stateOf(link->target);
     targets_.push_back({std::move(link->link), std::move(link->target), state});
   });
+  if (failed) problems_.push_back(fmt::format("Unable to look for links in {}: {}", root, failed.message()));
 }
 
 std::vector<std::string> SharedTargets::takeChanged() {
-  std::vector<std::string> lines;
+  std::vector<std::string> lines = std::exchange(problems_, {});
   for (const Target& target : std::exchange(targets_, {})) {
     if (stateOf(target.path) == target.state) continue;
     lines.push_back(fmt::format(

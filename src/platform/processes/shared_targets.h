@@ -15,8 +15,8 @@ class SharedTargets final {
   /// itself writes. Of very many files only some are looked at.
   SharedTargets(const std::string& folder, std::span<const std::string> own);
 
-  /// One line for each link behind which something has been written, created or removed since then; no more at the next
-  /// call.
+  /// One line for each link behind which something has been written, created or removed since then, or that could not
+  /// be examined; no more at the next call.
   std::vector<std::string> takeChanged();
 
  private:
@@ -27,6 +27,7 @@ class SharedTargets final {
   };
 
   std::vector<Target> targets_;
+  std::vector<std::string> problems_;
 };
 
 }  // namespace mirevo
