@@ -1,6 +1,7 @@
 #pragma once
 
 #include <optional>
+#include <string>
 #include <string_view>
 
 namespace mirevo {
@@ -14,6 +15,11 @@ constexpr std::optional<std::string_view> pathInFolder(std::string_view path, st
   if (path.empty()) return path;
   if (path.front() != '/') return std::nullopt;
   return path.substr(1);
+}
+
+/// The path of the folder that a path with a "/" names something in.
+inline std::string folderOf(std::string_view path) {
+  return std::string(path.substr(0, path.rfind('/')));
 }
 
 }  // namespace mirevo

@@ -11,6 +11,7 @@ void EvaluationLedger::begin(std::span<const ParameterSet> sets, DispatchMode mo
   results_.assign(sets.size(), {});
   isFinished_.assign(sets.size(), false);
   next_ = 0;
+  returned_.clear();
   finishedCount_ = 0;
   openCount_ = 0;
   isFinalRun_ = mode == DispatchMode::finalRun;
@@ -39,10 +40,18 @@ void EvaluationLedger::store(std::size_t place, EvaluationResult result) {
 
 std::optional<std::size_t> EvaluationLedger::takeNext() {
   while (next_ < sets_.size() && isFinished_[next_]) ++next_;
-  if (next_ == sets_.size()) return std::nullopt;
+  if (next_ == sets_.size() && returned_.empty()) return std::nullopt;
   if (openCount_ > 0 && pairComparison_.isAwaited()) return std::nullopt;
   ++openCount_;
-  return next_++;
+  if (returned_.empty()) return next_++;
+  const std::size_t first = *returned_.begin();
+  returned_.erase(returned_.begin());
+  return first;
+}
+
+void EvaluationLedger::putBack(std::size_t place) {
+  returned_.insert(place);
+  --openCount_;
 }
 
 void EvaluationLedger::markInitiated(std::size_t place) {
@@ -108,6 +117,7 @@ std::vector<EvaluationResult> EvaluationLedger::close() {
   sets_ = {};
   isFinished_.clear();
   next_ = 0;
+  returned_.clear();
   finishedCount_ = 0;
   openCount_ = 0;
   return std::exchange(results_, {});

@@ -41,6 +41,8 @@ class EvaluationLedger final {
   /// The next set, in order, that has no result yet; empty when all are taken, and as long as a model run may become
   /// the first successful one, by which the next ones are judged.
   std::optional<std::size_t> takeNext();
+  /// Takes a set back that could not be run where it was to be; it is the next one again.
+  void putBack(std::size_t place);
   const ParameterSet& set(std::size_t place) const { return sets_[place]; }
   /// The set's number in the run, from 1.
   int numberOf(std::size_t place) const { return evaluationCount_ + static_cast<int>(place) + 1; }
@@ -80,6 +82,7 @@ class EvaluationLedger final {
   std::vector<EvaluationResult> results_;
   std::vector<bool> isFinished_;                    ///< whether a set has its result
   std::size_t next_ = 0;                            ///< first set that was not taken
+  std::set<std::size_t> returned_;                  ///< sets that were taken and put back
   std::size_t finishedCount_ = 0;                   ///< sets that have a result
   std::size_t openCount_ = 0;                       ///< sets that were taken and have no result
   int evaluationCount_ = 0;                         ///< sets of the batches before this one

@@ -1,7 +1,10 @@
 #include "evaluation/local_evaluator.h"
 
+#include <algorithm>
 #include <cassert>
 #include <utility>
+
+#include <fmt/core.h>
 
 #include "common/fatal_error.h"
 
@@ -30,28 +33,42 @@ std::vector<EvaluationResult> LocalEvaluator::evaluateParameterSets(std::span<co
 
 void LocalEvaluator::startInFreeSlots() {
   for (int slot = 1; slot <= static_cast<int>(slots_.size()); ++slot) {
-    if (!slots_[static_cast<std::size_t>(slot - 1)]) startNext(slot);
+    const Slot& state = slots_[static_cast<std::size_t>(slot - 1)];
+    if (!state.running && !state.isGivenUp) startNext(slot);
   }
 }
 
 void LocalEvaluator::startNext(int slot) {
   while (const auto place = ledger_.takeNext()) {
     stopIfCancelled();
+    if (!isUsable(slot)) return ledger_.putBack(*place);
     runner_.requirePairs(ledger_.requiredPairs());
     auto failure = runner_.prepareModelRun(ledger_.set(*place), slot);
     if (!failure) {
       ledger_.markInitiated(*place);
-      slots_[static_cast<std::size_t>(slot - 1)] = *place;
+      slots_[static_cast<std::size_t>(slot - 1)].running = *place;
       return;
     }
     ledger_.finish(*place, runner_.failedResult(std::move(*failure)));
   }
 }
 
+bool LocalEvaluator::isUsable(int slot) {
+  std::vector<std::string> warnings;
+  const auto damage = runner_.renewIfDamaged(slot, warnings);
+  for (const std::string& text : warnings) observer_.warning(text);
+  if (!damage) return true;
+  slots_[static_cast<std::size_t>(slot - 1)].isGivenUp = true;
+  const bool isLast = std::all_of(slots_.begin(), slots_.end(), [](const Slot& state) { return state.isGivenUp; });
+  if (isLast) failWithoutSlots(*damage);
+  observer_.warning(givenUpWarning(fmt::format("Slot {}", slot), *damage));
+  return false;
+}
+
 bool LocalEvaluator::takeFinished() {
   bool any = false;
   for (int slot = 1; slot <= static_cast<int>(slots_.size()); ++slot) {
-    auto& running = slots_[static_cast<std::size_t>(slot - 1)];
+    auto& running = slots_[static_cast<std::size_t>(slot - 1)].running;
     if (!running) continue;
     std::int32_t executing = 0;
     std::int32_t status = 0;

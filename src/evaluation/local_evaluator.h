@@ -27,9 +27,16 @@ class LocalEvaluator final : public Evaluator {
   void settleAggregates(std::span<EvaluationResult> sample) override;
 
  private:
+  struct Slot {
+    std::optional<std::size_t> running;  ///< index in the batch of the set that it runs
+    bool isGivenUp = false;              ///< its process folder cannot be used any more
+  };
+
   void startInFreeSlots();
   /// Starts the next set on the free slot; sets that cannot be run get their result at once and are skipped.
   void startNext(int slot);
+  /// False if the slot is given up from now on. Throws FatalError if it was the last one.
+  bool isUsable(int slot);
   /// Takes the results of slots whose batch has ended and starts the next sets there; false when none has ended.
   bool takeFinished();
   void stopIfCancelled();
@@ -37,7 +44,7 @@ class LocalEvaluator final : public Evaluator {
   ModelRunner& runner_;
   EvaluationObserver& observer_;
   EvaluationLedger ledger_;
-  std::vector<std::optional<std::size_t>> slots_;  ///< index in the batch of the set that runs in each slot
+  std::vector<Slot> slots_;
 };
 
 }  // namespace mirevo

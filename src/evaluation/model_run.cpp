@@ -17,10 +17,14 @@
 #include "common/fatal_error.h"
 #include "common/file_copy.h"
 #include "common/files.h"
+#include "common/paths.h"
 #include "common/run_files.h"
 #include "common/text.h"
 #include "measures/measure_file.h"
 #include "parameters/read_template.h"
+#include "platform/processes/folder_room.h"
+#include "platform/processes/leaving_links.h"
+#include "platform/processes/own_files.h"
 #include "platform/processes/process_folder.h"
 
 namespace mirevo {
@@ -109,7 +113,11 @@ ModelRunner::ModelRunner(ModelDescription description, ParameterModel& parameter
       processFolderPrefix_(launcherSettings.processFolderPrefix),
       shownRuns_(ToModelScale(parameters.searchSpace(), parameters.searchSpace().initial)) {
   requireFilesInBaseFolder();
-  const std::vector<std::string> converted = readTemplates();
+  LauncherSettings settings = launcherSettings;
+  needs_ = folderNeeds(settings);
+  settings.ownFiles = needs_.ownFiles();
+  warnings_ = requireOwnFiles(description_.baseFolder, settings.ownFiles);
+  readTemplates();
   series_ = SeriesTables::MirevoTSobjectInit(description_.measures, description_.period);
   shownMeasures_ = measuresOfDistinctPairs(description_.measures);
   savedFiles_ = SavedFiles(description_.savedFiles, description_.baseFolder, description_.savedFolder);
@@ -119,24 +127,58 @@ ModelRunner::ModelRunner(ModelDescription description, ParameterModel& parameter
     observedSeries_.push_back(
         readObservedSeries(i, measure, description_.period, description_.keptPrecision, series_.observation(i)));
   }
-  if (launcherSettings.slotCount > 0 && !launcher_.initialise(launcherSettings)) {
+  if (settings.slotCount > 0 && !launcher_.initialise(settings)) {
     fatalError("Error: Unable to initialise MirevoSimpleLaunch", launcher_.lastError());
   }
-  for (int slot = 1; slot <= launcherSettings.slotCount; ++slot) {
+  if (settings.slotCount > 0 && settings.firstFolderNumber == 1 && description_.runsAtOnce > 1) {
+    const std::vector<std::string> own{description_.baseFolder, folderOf(processFolderPrefix_),
+                                       folderOf(description_.savedFolder)};
+    sharedTargets_ = SharedTargets(launcher_.getProcessFolder(1), own);
+  }
+  for (int slot = 1; slot <= settings.slotCount; ++slot) {
     SlotFiles& files = slots_.emplace_back();
-    for (std::size_t i = 0; i < description_.parameterFiles.size(); ++i) {
-      const ParameterFileItem& item = description_.parameterFiles[i];
+    for (const ParameterFileItem& item : description_.parameterFiles) {
       files.parameterFiles.push_back(slotPath(item.paramFileName, slot));
-      if (converted[i].empty()) continue;
-      // For inspection only; in the copies, since the base folder is never written to.
-      const std::string name = slotPath(item.templateFileName, slot) + description_.fileTag + ".tpl";
-      std::string reason;
-      if (!writeByUnlinkAndCreate(name, converted[i], 0666, reason))
-        fatalError("Error: Unable to open " + name, reason);
     }
+    writeConvertedTemplates(slot);
     for (const std::string& name : series_.simulationFileNames()) files.simulationFiles.push_back(slotPath(name, slot));
     if (!description_.measureFile.empty()) files.measureFile = slotPath(description_.measureFile, slot);
   }
+}
+
+/// For inspection only; in the copies, since the base folder is never written to.
+void ModelRunner::writeConvertedTemplates(int slot) const {
+  for (std::size_t i = 0; i < convertedTexts_.size(); ++i) {
+    const std::string& templateName = description_.parameterFiles[i].templateFileName;
+    // One behind a link that all slots share is not theirs to write beside.
+    const bool isShared =
+        findLeavingLink(launcher_.getProcessFolder(slot), folderOf(belowBase(templateName))).has_value();
+    if (convertedTexts_[i].empty() || isShared) continue;
+    const std::string name = slotPath(templateName, slot) + description_.fileTag + ".tpl";
+    std::string reason;
+    if (!writeByUnlinkAndCreate(name, convertedTexts_[i], 0666, reason))
+      fatalError("Error: Unable to open " + name, reason);
+  }
+}
+
+FolderNeeds ModelRunner::folderNeeds(const LauncherSettings& settings) const {
+  FolderNeeds needs;
+  needs.baseFolder = description_.baseFolder;
+  for (const ParameterFileItem& item : description_.parameterFiles) {
+    needs.parameterFiles.push_back(belowBase(item.paramFileName));
+  }
+  for (const OutputMeasure& measure : description_.measures) {
+    if (measure.interfaceType == InterfaceType::timeSeries)
+      needs.outputs.push_back(belowBase(measure.simulation.fileName));
+  }
+  if (!description_.measureFile.empty()) needs.outputs.push_back(belowBase(description_.measureFile));
+  for (const std::string& name : description_.savedFiles) needs.savedFiles.push_back(belowBase(name));
+  for (const BatchItem& item : settings.batchItems) needs.batchFiles.push_back(belowBase(item.batchFileName));
+  return needs;
+}
+
+std::string ModelRunner::belowBase(const std::string& file) const {
+  return std::string(trimTrailing(file).substr(description_.baseFolder.size()));
 }
 
 void ModelRunner::requireFilesInBaseFolder() const {
@@ -160,16 +202,14 @@ void ModelRunner::requireFilesInBaseFolder() const {
   }
 }
 
-std::vector<std::string> ModelRunner::readTemplates() {
-  std::vector<std::string> converted;
+void ModelRunner::readTemplates() {
   const std::vector<ModelParameter>& parameters = parameters_.parameters();
   for (const ParameterFileItem& item : description_.parameterFiles) {
     ReadTemplate read = readTemplate(item, parameters);
     templates_.push_back(std::move(read.filled));
-    templateWarnings_.insert(templateWarnings_.end(), read.doubts.begin(), read.doubts.end());
-    converted.push_back(std::move(read.converted));
+    warnings_.insert(warnings_.end(), read.doubts.begin(), read.doubts.end());
+    convertedTexts_.push_back(std::move(read.converted));
   }
-  return converted;
 }
 
 EqualMeasures ModelRunner::equalMeasures() const {
@@ -206,7 +246,7 @@ PairComparison ModelRunner::pairComparison() const {
 }
 
 std::string ModelRunner::slotPath(const std::string& baseFile, int slot) const {
-  return launcher_.getProcessFolder(slot) + std::string(trimTrailing(baseFile).substr(description_.baseFolder.size()));
+  return launcher_.getProcessFolder(slot) + belowBase(baseFile);
 }
 
 std::optional<EvaluationFailure> ModelRunner::findUnwritable(std::span<const double> modelValues) const {
@@ -223,12 +263,35 @@ std::optional<EvaluationFailure> ModelRunner::findUnrunnable(std::span<const dou
   return findUnwritable(std::get<std::span<const double>>(mapped));
 }
 
+std::optional<FolderDamage> ModelRunner::renewIfDamaged(int slot, std::vector<std::string>& warnings) {
+  SlotFiles& files = slots_.at(static_cast<std::size_t>(slot - 1));
+  if (!files.isUsed) return std::nullopt;
+  const std::string folder = launcher_.getProcessFolder(slot);
+  auto damage = findDamage(folder, needs_);
+  if (!damage) {
+    files.isRenewed = false;
+    return std::nullopt;
+  }
+  if (files.isRenewed) return damage;
+  if (!launcher_.renewFolder(slot)) {
+    damage->why += fmt::format("; the process folder could not be made anew: {}", launcher_.lastError());
+    return damage;
+  }
+  writeConvertedTemplates(slot);
+  files.isUsed = false;
+  files.isRenewed = true;
+  warnings.push_back(
+      fmt::format("The process folder {} was made anew, as the model had damaged it. {}", folder, damage->text()));
+  return std::nullopt;
+}
+
 std::optional<EvaluationFailure> ModelRunner::prepareModelRun(std::span<const double> set, int slot) {
   const auto mapped = parameters_.MapToModelValues(set);
   if (const auto* failure = std::get_if<ParameterFailure>(&mapped)) return parameterFailure(*failure);
   const auto modelValues = std::get<std::span<const double>>(mapped);
   if (auto failure = findUnwritable(modelValues)) return failure;
-  const SlotFiles& files = slots_.at(static_cast<std::size_t>(slot - 1));
+  SlotFiles& files = slots_.at(static_cast<std::size_t>(slot - 1));
+  files.isUsed = true;
   // Files of an earlier run must never be taken for results of this one.
   for (const std::string& path : files.simulationFiles) removeFile(path);
   if (!files.measureFile.empty()) removeFile(files.measureFile);
@@ -253,6 +316,7 @@ void ModelRunner::updateResistanceNumbers(const std::string& path) {
 
 EvaluationResult ModelRunner::collect(int slot) {
   EvaluationResult result = judge(slot);
+  for (std::string& line : sharedTargets_.takeChanged()) result.warnings.push_back(std::move(line));
   if (result.ok() && shownRuns_.mayBeShown(slot, result.aggregate)) {
     for (const std::size_t i : shownMeasures_) {
       result.shownSeries.push_back(
@@ -327,13 +391,16 @@ void ModelRunner::keepOutputFiles(int slot, int number, EvaluationResult& result
 void ModelRunner::keepFailedFolder(int slot, int number, std::vector<std::string>& warnings) const {
   const std::string folder = launcher_.getProcessFolder(slot);
   const std::string kept = fmt::format("{}{}", description_.failedFolderPrefix, number);
-  std::string reason;
+  std::string reason = whyNoRoom(folder, folderOf(kept), description_.runsAtOnce);
   try {
-    makeProcessFolder(folder, kept, processFolderPrefix_);
-    const std::string log = std::string("/") + run_files::kBatchLog;  // not part of the model, so not copied with it
-    struct stat status {};
-    const bool hasLog = ::stat((folder + log).c_str(), &status) == 0 || errno != ENOENT;
-    if (!hasLog || copyWhole(folder + log, kept + log, reason)) return;
+    if (reason.empty()) {
+      makeProcessFolder(folder, kept, processFolderPrefix_);
+      const std::string log = std::string("/") + run_files::kBatchLog;  // not part of the model, so not copied with it
+      struct stat status {};
+      const bool hasLog = ::stat((folder + log).c_str(), &status) == 0 || errno != ENOENT;
+      if (!hasLog || copyWhole(folder + log, kept + log, reason)) return;
+      removeIfPossible(kept);
+    }
   } catch (const FatalError& error) {
     reason = error.message();
   }
@@ -364,7 +431,12 @@ std::optional<EvaluationFailure> ModelRunner::findMissingResults(int slot) const
   if (!files.measureFile.empty()) wanted.push_back(files.measureFile);
   for (const std::string& path : wanted) {
     struct stat status {};
-    if (::stat(path.c_str(), &status) == 0) continue;
+    if (::stat(path.c_str(), &status) == 0) {
+      const std::string folder = launcher_.getProcessFolder(slot);
+      const auto link = findLeavingLink(folder, std::string_view(path).substr(folder.size()));
+      if (!link) continue;
+      return makeFailure(Kind::resultsNotReadable, fmt::format("{}: {}", path, describe(*link)), slot);
+    }
     if (errno == ENOENT || errno == ENOTDIR) {
       return makeFailure(Kind::resultsNotWritten, "the batch ended well but did not write " + path, slot);
     }

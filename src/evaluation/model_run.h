@@ -3,10 +3,12 @@
 #include <optional>
 #include <span>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "evaluation/equal_measures.h"
 #include "evaluation/evaluation_result.h"
+#include "evaluation/folder_damage.h"
 #include "evaluation/pair_comparison.h"
 #include "evaluation/saved_files.h"
 #include "evaluation/shown_runs.h"
@@ -18,6 +20,7 @@
 #include "parameters/parameter_model.h"
 #include "parameters/template_file.h"
 #include "platform/processes/process_launcher.h"
+#include "platform/processes/shared_targets.h"
 
 namespace mirevo {
 
@@ -34,8 +37,9 @@ struct ModelDescription {
   std::vector<std::string> savedFiles;  ///< files kept from every model run
   std::string savedFolder;              ///< where they are kept
   std::string failedFolderPrefix;       ///< path of a failed run's folder, without the evaluation number that follows
-  bool computeExactMeasures = false;    ///< results hold the measures in 64 bits, too
-  bool keepSimulatedValues = false;     ///< results hold the simulated values at the observation times
+  int runsAtOnce = 1;                 ///< model runs side by side, of all ranks, whose room on the disk is left to them
+  bool computeExactMeasures = false;  ///< results hold the measures in 64 bits, too
+  bool keepSimulatedValues = false;   ///< results hold the simulated values at the observation times
   SeriesPrecision keptPrecision = SeriesPrecision::single;
 };
 
@@ -54,6 +58,11 @@ class ModelRunner final {
 
   /// From now on a model run with less than the least share of these pairs is a failed evaluation.
   void requirePairs(RequiredPairs required) { requiredPairs_ = std::move(required); }
+
+  /// To be called before a model run in the slot: if the run before it has damaged the process folder, makes that anew,
+  /// with a line in `warnings`. Returns why the slot cannot be used any more: this failed, or the run in the folder
+  /// that was made anew has damaged it again. Empty if it can.
+  std::optional<FolderDamage> renewIfDamaged(int slot, std::vector<std::string>& warnings);
 
   /// Builds the full parameter vector, removes the results of the slot's last run, writes the parameter files and
   /// starts the batch; or returns why the set is not run. Throws FatalError when a file cannot be removed or written.
@@ -89,8 +98,8 @@ class ModelRunner final {
   EqualMeasures equalMeasures() const;
   /// A comparison of the pairs of model runs, for the evaluations of a run.
   PairComparison pairComparison() const;
-  /// templateDoubts() of all templates.
-  const std::vector<std::string>& templateWarnings() const { return templateWarnings_; }
+  /// What the user should know of links in the model's folder, and templateDoubts() of all templates.
+  const std::vector<std::string>& warnings() const { return warnings_; }
 
  private:
   /// Paths of one slot's copies of the model's files.
@@ -98,13 +107,18 @@ class ModelRunner final {
     std::vector<std::string> parameterFiles;   ///< in the order of ModelDescription::parameterFiles
     std::vector<std::string> simulationFiles;  ///< in the order of SeriesTables::simulationFileNames()
     std::string measureFile;                   ///< empty when there is none
+    bool isUsed = false;                       ///< a model has run in the folder
+    bool isRenewed = false;                    ///< it was made anew, and no run has left it whole since
   };
 
+  FolderNeeds folderNeeds(const LauncherSettings& settings) const;
   void requireFilesInBaseFolder() const;
-  /// Returns one text per parameter file: that of a converted numeric-ID template, empty for the others.
-  std::vector<std::string> readTemplates();
+  void writeConvertedTemplates(int slot) const;
+  void readTemplates();
   /// The failure of a set with a value that a template has no form for; empty when all can be written.
   std::optional<EvaluationFailure> findUnwritable(std::span<const double> modelValues) const;
+  /// The part of a path in the base folder that follows it, with its leading "/".
+  std::string belowBase(const std::string& file) const;
   std::string slotPath(const std::string& baseFile, int slot) const;
   void updateResistanceNumbers(const std::string& path);
   EvaluationResult judge(int slot);
@@ -123,10 +137,13 @@ class ModelRunner final {
   ObjectiveAggregator& aggregator_;
   ProcessLauncher& launcher_;
   std::string processFolderPrefix_;
+  FolderNeeds needs_;
   std::vector<ParameterTemplate> templates_;  ///< one per parameter file
-  std::vector<std::string> templateWarnings_;
+  std::vector<std::string> convertedTexts_;   ///< one per parameter file: that of a converted numeric-ID template
+  std::vector<std::string> warnings_;
   SeriesTables series_;
   SavedFiles savedFiles_;
+  SharedTargets sharedTargets_;  ///< looked at again after the first model run
   std::vector<ObservedSeries> observedSeries_;
   std::vector<std::size_t> shownMeasures_;
   ShownRuns shownRuns_;

@@ -13,6 +13,7 @@
 
 #include "common/file_copy.h"
 #include "common/text.h"
+#include "platform/processes/leaving_links.h"
 
 namespace mirevo {
 namespace {
@@ -58,6 +59,8 @@ std::vector<std::string> SavedFiles::save(const std::string& processFolder, int 
       reason = std::strerror(errno);
     } else if (isMarked(status)) {
       reason = "the model run did not write it";
+    } else if (const auto link = findLeavingLink(processFolder, name)) {
+      reason = describe(*link);
     } else {
       std::error_code failed;
       std::filesystem::create_directories(std::filesystem::path(target).parent_path(), failed);

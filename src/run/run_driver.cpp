@@ -208,7 +208,7 @@ void RunDriver::logSetup() {
   if (config_.task) {
     for (const std::string& text : config_.task->warnings(parameters_->searchSpace())) state_.log.warning(text);
   }
-  for (const std::string& text : runner_->templateWarnings()) state_.log.warning(text);
+  for (const std::string& text : runner_->warnings()) state_.log.warning(text);
   for (const std::string& text :
        unusedParameterWarnings(config_.parameters, config_.constraints, runner_->templates())) {
     state_.log.warning(text);

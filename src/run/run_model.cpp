@@ -25,6 +25,7 @@ ModelDescription describeModel(const RunConfig& config) {
   for (const SavedOutputFile& file : config.savedOutputFiles) model.savedFiles.push_back(file.fileName);
   model.savedFolder = runFilePath(config.setupFolder + "/" + config.setupName, run_files::kSavedFolder);
   model.failedFolderPrefix = runFilePath(processFolderPrefix(config), run_files::kFailedFolder);
+  model.runsAtOnce = config.simultaneousSimulations;
   model.computeExactMeasures = config.usesExactMeasures();
   model.keepSimulatedValues = config.keepsSimulatedValues();
   if (config.task) model.keptPrecision = config.task->keptPrecision();

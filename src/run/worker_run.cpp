@@ -2,6 +2,7 @@
 
 #include <new>
 #include <optional>
+#include <utility>
 
 #include <fmt/core.h>
 
@@ -31,7 +32,9 @@ void work(Job& job) {
   ObjectiveAggregator aggregator(config.objectives, config.aggregationMethod);
   PosixProcessLauncher launcher;
   signalState.haltProcesses = haltProcessesFromSignal;
-  ModelRunner runner(describeModel(config), parameters, aggregator, launcher, launcherSettings(config, 1, job.rank()));
+  ModelDescription model = describeModel(config);
+  model.runsAtOnce = job.processCount() - 1;  // they may share a disk
+  ModelRunner runner(std::move(model), parameters, aggregator, launcher, launcherSettings(config, 1, job.rank()));
   runWorkerLoop(job, runner);
 }
 

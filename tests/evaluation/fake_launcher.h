@@ -29,12 +29,15 @@ class FakeLauncher final : public ProcessLauncher {
 
   bool initialise(const LauncherSettings& settings) override {
     prefix_ = settings.processFolderPrefix;
+    baseFolder_ = settings.baseFolder;
     slots_.resize(static_cast<std::size_t>(settings.slotCount));
-    for (int slot = 1; slot <= settings.slotCount; ++slot) {
-      std::filesystem::remove_all(getProcessFolder(slot));
-      std::filesystem::copy(settings.baseFolder, getProcessFolder(slot), std::filesystem::copy_options::recursive);
-    }
+    for (int slot = 1; slot <= settings.slotCount; ++slot) renewFolder(slot);
     return initialiseError.empty();
+  }
+  bool renewFolder(int slot) override {
+    std::filesystem::remove_all(getProcessFolder(slot));
+    std::filesystem::copy(baseFolder_, getProcessFolder(slot), std::filesystem::copy_options::recursive);
+    return true;
   }
   const std::string& lastError() const override { return initialiseError; }
   std::string getProcessFolder(int slot) const override { return prefix_ + std::to_string(slot); }
@@ -106,6 +109,7 @@ class FakeLauncher final : public ProcessLauncher {
 
   Script script_;
   std::string prefix_;
+  std::string baseFolder_;
   std::vector<Slot> slots_;
 };
 

@@ -1,6 +1,8 @@
 #include "evaluation/local_evaluator.h"
 
+#include <filesystem>
 #include <fstream>
+#include <functional>
 #include <map>
 #include <tuple>
 
@@ -332,6 +334,87 @@ TEST_F(LocalEvaluatorTest, TheFoldersOfTheFirstFailedRunsAreKept) {
   EXPECT_EQ(folder_.read("run_Failed3/mirevo_batch.log"), "why");
   EXPECT_THAT(folder_.read("run_Failed4/parameters.txt"), EndsWith(" 3\n"));
   EXPECT_FALSE(folder_.exists("run_Failed5"));
+
+  description_.runsAtOnce = 2'000'000'000;
+  earlier_.reset();
+  evaluate(makeEvaluator(launcher, 1, 100), {4.0});
+  EXPECT_FALSE(folder_.exists("run_Failed1")) << "no room for it";
+  EXPECT_THAT(observer_.events, Contains(HasSubstr("was not kept as " + (folder_ / "run_Failed1") + ": it needs ")));
+}
+
+TEST_F(LocalEvaluatorTest, AFolderThatAModelDamagesIsMadeAnewOnceAndThenGivenUp) {
+  namespace fs = std::filesystem;
+  fs::create_directory(folder_ / "elsewhere");
+  folder_.write("elsewhere/simulated.csv", "another's");
+  folder_.write("base/out/simulated.csv", series(0.0));
+  description_.measures.push_back(description_.measures.front());
+  description_.measures.back().simulation.fileName = folder_ / "base/out/simulated.csv";
+  description_.objectives.front().measures.push_back(1);
+  using Damage = std::function<void(const std::string&)>;
+  const std::tuple<Damage, const char*> cases[] = {
+      {[](const std::string& folder) { fs::remove_all(folder); }, "Unable to work in {}: No such file or directory"},
+      {[](const std::string& folder) { fs::remove(folder + "/run.sh"); }, "Unable to open {}/run.sh: No such file"},
+      {[](const std::string& folder) { fs::remove(folder + "/parameters.txt"); },
+       "Unable to open {}/parameters.txt: No such file"},
+      {[](const std::string& folder) {
+         fs::remove(folder + "/simulated.csv");
+         fs::create_directory(folder + "/simulated.csv");
+       },
+       "Unable to remove {}/simulated.csv: Is a directory"},
+      {[this](const std::string& folder) {
+         fs::remove_all(folder + "/out");
+         fs::create_directory_symlink(folder_ / "elsewhere", folder + "/out");
+       },
+       "Unable to work with {0}/out/simulated.csv: the link {0}/out leads to "},
+  };
+  const std::string second = folder_ / "run_Process2";
+  for (const auto& [damage, text] : cases) {
+    observer_.events.clear();
+    // Only runs in the second slot do it.
+    FakeLauncher launcher([&](int, const std::string&) {
+      FakeLauncher::Batch batch = computes(1.0);
+      batch.write = [&, compute = batch.write](const std::string& folder) {
+        compute(folder);
+        fs::copy_file(folder + "/simulated.csv", folder + "/out/simulated.csv");
+        if (folder == second) damage(folder);
+      };
+      return batch;
+    });
+    LocalEvaluator& evaluator = makeEvaluator(launcher, 2, 100);
+    const auto results = evaluate(evaluator, {1.0, 2.0, 3.0, 4.0, 6.0, 7.0});
+    EXPECT_EQ(launcher.starts, 6);
+    EXPECT_THAT(measuresOf({results[0], results[2], results[4], results[5]}), ElementsAre(0.0, 2.0, 5.0, 6.0));
+    const std::string told = fmt::format(fmt::runtime(text), second);
+    EXPECT_THAT(observer_.events,
+                testing::IsSupersetOf({StartsWith("warning: The process folder " + second +
+                                                  " was made anew, as the model had damaged it. " + told),
+                                       StartsWith("warning: Slot 2 is given up and runs no model any more, as its "
+                                                  "process folder was damaged again. " +
+                                                  told)}));
+    EXPECT_EQ(folder_.read("elsewhere/simulated.csv"), "another's") << "it is removed before a run in its own folder";
+  }
+}
+
+TEST_F(LocalEvaluatorTest, ADamagedFolderIsFatalOnlyWhereNoSlotIsLeft) {
+  int rarely = 0;  // the last run that leaves the folder whole of so many; 0: none does
+  FakeLauncher launcher([&](int start, const std::string&) {
+    FakeLauncher::Batch batch = computes(1.0);
+    batch.write = [&, start, compute = batch.write](const std::string& folder) {
+      compute(folder);
+      if (rarely == 0 || start % rarely != 0) std::filesystem::remove(folder + "/parameters.txt");
+    };
+    return batch;
+  });
+  LocalEvaluator& evaluator = makeEvaluator(launcher, 1, 100);
+  EXPECT_THAT(refusalOf([&] {
+                evaluate(evaluator, {1.0, 2.0, 3.0, 4.0});
+              }),
+              StartsWith("Error: Unable to open " + (folder_ / "run_Process1/parameters.txt") +
+                         "\nNo such file or directory\nno process folder is left"));
+  EXPECT_EQ(launcher.starts, 2);
+  launcher.starts = 0;
+  rarely = 2;
+  EXPECT_EQ(evaluate(makeEvaluator(launcher, 1, 100), {1.0, 2.0, 3.0, 4.0, 6.0}).size(), 5U);
 }
 
 }  // namespace

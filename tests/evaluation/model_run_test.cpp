@@ -194,6 +194,30 @@ TEST_F(ModelRunTest, SavedFilesAreThoseThatTheRunWrote) {
   EXPECT_FALSE(folder_.exists("run_Saved/9/out/state.txt"));
 }
 
+TEST_F(ModelRunTest, AFileBehindALinkOutOfTheProcessFolderIsNeitherReadNorKept) {
+  folder_.write("shared/simulated.csv", series(4.0));
+  description_.savedFiles = {folder_ / "base/simulated.csv"};
+  description_.savedFolder = folder_ / "run_Saved";
+  makeRunner(launcher_, 1);
+  for (const bool leaves : {true, false}) {
+    batch_.write = [&](const std::string& folder) {
+      std::ofstream(folder + "/own.csv") << series(4.0);
+      std::filesystem::create_symlink(leaves ? folder_ / "shared/simulated.csv" : "own.csv", folder + "/simulated.csv");
+    };
+    EvaluationResult result = evaluate(2.0);
+    runner_->keepOutputFiles(1, 1, result);
+    ASSERT_EQ(result.ok(), !leaves);
+    EXPECT_EQ(folder_.exists("run_Saved/1/simulated.csv"), !leaves);
+    if (!leaves) continue;
+    const std::string file = folder_ / "run_Process1/simulated.csv";
+    EXPECT_EQ(result.failure->kind, Kind::resultsNotReadable);
+    EXPECT_THAT(result.failure->reason,
+                StartsWith(file + ": the link " + file + " leads to " + (folder_ / "shared/simulated.csv")));
+    EXPECT_THAT(result.warnings, ElementsAre(StartsWith(file + " was not kept: the link ")));
+  }
+  EXPECT_EQ(folder_.read("shared/simulated.csv"), series(4.0));
+}
+
 TEST_F(ModelRunTest, NumericIdTemplatesAreConvertedIntoTheSlotsAlone) {
   folder_.write("base/parameters.tpl", "a = 1.5E-035\n");
   description_.parameterFiles[0].templateType = TemplateType::numericId;

@@ -191,6 +191,68 @@ void tryFullDisk(bool isLong, FaultReport& report) {
   }
 }
 
+/// Failed runs whose folders are to be kept on a disk that has no room for them.
+void tryKeptFolders(bool isLong, FaultReport& report) {
+  const SmallDisk disk;
+  if (!disk.isThere()) {
+    report.skipped("kept folders", "no disk of its own can be mounted: " + disk.reason());
+    return;
+  }
+  constexpr std::uintmax_t kModelSize = 3'000'000;
+  constexpr int kBlocksOfMegabyte = 256;
+  ::setenv("TMPDIR", disk.path().c_str(), 1);
+  const auto run =
+      std::make_unique<FaultyRun>(RunSettings{.option = 3, .maxEvaluations = 60, .modelArguments = "--fail-above 5.8"});
+  ::unsetenv("TMPDIR");
+  run->folder().write("model/grid.bin", std::string(kModelSize, 'x'));
+  run->makeReference();
+  for (int room = 5; room <= 25; room += isLong ? 1 : 5) {
+    run->reset();
+    if (!disk.leave(room * kBlocksOfMegabyte, -1)) throw std::runtime_error(std::strerror(errno));
+    auto problems = run->check(run->run({}), {.mayPassSilently = true, .exitCode = 0});
+    disk.leave(-1, -1);
+    for (const auto& entry : fs::directory_iterator(run->path())) {
+      if (entry.path().filename().string().find("_Failed") == std::string::npos || !entry.is_directory()) continue;
+      std::error_code none;
+      const bool isWhole =
+          fs::exists(entry.path() / "mirevo_batch.log") && fs::file_size(entry.path() / "grid.bin", none) == kModelSize;
+      if (!isWhole) problems.push_back("half a copy: " + entry.path().string());
+    }
+    report.tried("kept folders", fmt::format("room for {} MB, of which the process folder takes 3", room), problems,
+                 run->checkNextRun());
+  }
+}
+
+/// A model that leaves its process folder unusable, in the second of two slots or in both.
+void tryDamagedFolders(FaultReport& report) {
+  // what it does, the slots, what the log says
+  constexpr std::tuple<const char*, const char*, const char*> kCases[] = {
+      {"rm -rf \"$PWD\"", "2", "Slot 2 is given up"},
+      {"rm -rf \"$PWD\" && ln -s {} \"$PWD\"", "2", "Slot 2 is given up"},
+      {"rm -f simulated.csv; mkdir simulated.csv simulated.csv/x", "2", "Slot 2 is given up"},
+      {"rm run.sh", "2", "Slot 2 is given up"},
+      {"rm parameters.txt; mkdir parameters.txt", "2", "Slot 2 is given up"},
+      {"rm parameters.txt", "?", "no process folder is left"},
+      {"mv simulated.csv {0}; ln -s {0}/simulated.csv .", "2", "leads to"}};
+  for (const auto& [damage, slots, told] : kCases) {
+    const TemporaryFolder outside;
+    const std::string command = fmt::format(fmt::runtime(damage), outside.path());
+    FaultyRun run(RunSettings{.option = 3, .maxEvaluations = 30, .slots = 2},
+                  fmt::format("{0} \"$@\" || exit 1\n"
+                              "test -e {1}/armed && case $PWD in *_Process{2}) {3};; esac\n"
+                              "exit 0",
+                              MIREVO_TEST_MODEL, outside.path(), slots, command));
+    run.makeReference();
+    outside.write("armed", "");
+    run.reset();
+    const bool isFatal = std::string(told) != "Slot 2 is given up";
+    const auto problems =
+        run.check(run.run({}), {.names = {told}, .mayFailEvaluation = true, .exitCode = isFatal ? 1 : 0});
+    fs::remove(outside / "armed");
+    report.tried("damaged folders", command + " in slot " + slots, problems, run.checkNextRun());
+  }
+}
+
 /// The model itself removes, in its third run, what the program works with.
 void tryRemovedFiles(FaultReport& report) {
   // named: the message names it; null: the run does not need it any more
@@ -201,8 +263,8 @@ void tryRemovedFiles(FaultReport& report) {
       {"basin._spi_", nullptr, ""},
       {"basin_Saved", nullptr, ""},
       {"basin_Process1", "basin_Process1/simulated.csv", ""},
-      {"basin_Process1/parameters.txt", "basin_Process1/parameters.txt", "No such file"},
-      {"basin_Process1/run.sh", "run.sh", "No such file or directory"},
+      {"basin_Process1/parameters.txt", nullptr, ""},
+      {"basin_Process1/run.sh", nullptr, ""},
       {"basin_Optimisation.dat", nullptr, ""},
       {"basin.log", nullptr, ""}};
   for (const auto& [removed, named, reason] : kCases) {
@@ -233,6 +295,8 @@ void tryRealFaults(bool isLong, FaultReport& report) {
   tryForbiddenFiles(report);
   tryLimits(isLong, report);
   tryRemovedFiles(report);
+  tryDamagedFolders(report);
+  tryKeptFolders(isLong, report);
   tryFullDisk(isLong, report);
 }
 

@@ -143,11 +143,11 @@ TEST_F(Mpi, AnErrorEndsTheJobWithItsMessageOnce) {
        {.modelArguments = "--fail-above -1"},
        "Error: Unable to continue. No of failed",
        "run.sh exited with code 3"},
-      // The first run leaves a folder where the second one's worker is to write the parameters.
+      // Each run leaves a folder where the next one's worker is to write the parameters.
       {"cp parameters.txt copy; rm -f parameters.txt; mkdir -p parameters.txt/full; set -- --parameters copy",
        {},
-       "parameters.txt",
-       "reported by worker "},
+       "Error: Unable to open ",
+       "parameters.txt\n"},
       {"", {.batchFile = "model/none.sh"}, "Error: The file ", "none.sh"},
   };
   for (auto [script, settings, message, detail] : cases) {

@@ -108,6 +108,29 @@ TEST(Optimisation, ResultsAreTheSameBitsWhateverOrderTheModelRunsEndIn) {
   }
 }
 
+TEST(Optimisation, SlotsDoNotShareWhatALinkInTheModelsFolderLeadsTo) {
+  const ModelFolder folder;
+  folder.useScript("cd out && cp ../parameters.txt . && date >../work/$$ && " + std::string(kSleepByParameters));
+  folder.write("model/out/simulated.csv", folder.read("observed.csv"));
+  std::filesystem::create_directory(folder / "work");
+  std::filesystem::create_directory_symlink("../work", folder / "model/work");
+  folder.writeSetup({.algorithm = 1, .maxEvaluations = 40, .slots = 4});
+  folder.editSetup("model/simulated.csv", "model/out/simulated.csv");
+  const auto run = [&folder] {
+    const ProgramResult result = runProgram({folder / "basin.kdx"});
+    EXPECT_EQ(result.exitCode, 0) << result.error;
+    return withoutDates(folder.read("basin_Optimisation.dat"));
+  };
+  const std::string wanted = run();
+  std::filesystem::rename(folder / "model/out", folder / "scratch");
+  std::filesystem::create_directory_symlink(folder / "scratch", folder / "model/out");
+  EXPECT_EQ(run(), wanted);
+  EXPECT_EQ(folder.read("scratch/simulated.csv"), folder.read("observed.csv"));
+  EXPECT_FALSE(folder.exists("scratch/parameters.txt"));
+  EXPECT_THAT(folder.read("basin.log"), AllOf(HasSubstr("\nWarning: The link " + (folder / "model/out") + " leads to "),
+                                              HasSubstr(": " + (folder / "work") + " was changed during the first")));
+}
+
 TEST(Scenarios, ASingleRunEvaluatesTheInitialSet) {
   const ModelFolder folder;
   const std::string setup = folder.writeSetup({.option = 0});

@@ -1,5 +1,6 @@
 #include "evaluation/ranks/rank_evaluator.h"
 
+#include <algorithm>
 #include <utility>
 
 #include <fmt/core.h>
@@ -42,7 +43,7 @@ std::vector<EvaluationResult> RankEvaluator::evaluateParameterSets(std::span<con
 
 void RankEvaluator::startOnFreeWorkers() {
   for (int rank = 1; rank < job_.processCount(); ++rank) {
-    if (worker(rank).place && !worker(rank).set) startNext(rank);
+    if (worker(rank).place && !worker(rank).set && !worker(rank).isGivenUp) startNext(rank);
   }
 }
 
@@ -71,6 +72,8 @@ void RankEvaluator::handle(const Message& message) {
     }
     case RankMessage::result:
       return takeResult(message.rank, decodeResult(message.content));
+    case RankMessage::givenUp:
+      return giveUp(message.rank, decodeGivenUp(message.content));
     case RankMessage::failure:
       failWith(message.rank, decodeFailure(message.content));
     default:
@@ -80,24 +83,44 @@ void RankEvaluator::handle(const Message& message) {
 }
 
 void RankEvaluator::takeResult(int rank, ResultMessage message) {
-  const auto place = std::exchange(worker(rank).set, std::nullopt);
-  if (!place) {
-    fatalError(kCommunicationFailed, fmt::format("the worker with rank {} sent a result that nobody asked for", rank));
-  }
+  const std::size_t place = takeSetOf(rank);
   EvaluationResult& result = message.result;
   // Only the master knows the transformation determined from the initial sample.
   if (result.ok()) result.aggregate = runner_.aggregator().aggregate(result.objectiveValues);
   if (ledger_.isFolderWanted(result)) {
-    job_.send(rank, static_cast<int>(RankMessage::keepFolder), encode(KeepFolderMessage{ledger_.numberOf(*place)}));
+    job_.send(rank, static_cast<int>(RankMessage::keepFolder), encode(KeepFolderMessage{ledger_.numberOf(place)}));
   }
-  ledger_.finish(*place, std::move(result), message.leftBehind);
+  ledger_.finish(place, std::move(result), message.leftBehind);
+}
+
+std::size_t RankEvaluator::takeSetOf(int rank) {
+  const auto place = std::exchange(worker(rank).set, std::nullopt);
+  if (!place) {
+    fatalError(kCommunicationFailed, fmt::format("the worker with rank {} sent a result that nobody asked for", rank));
+  }
+  return *place;
+}
+
+void RankEvaluator::giveUp(int rank, const GivenUpMessage& message) {
+  ledger_.putBack(takeSetOf(rank));
+  worker(rank).isGivenUp = true;
+  for (const std::string& text : message.warnings) observer_.warning(text);
+  const FolderDamage damage{message.what, fmt::format("{}; reported by {}", message.why, nameOf(rank))};
+  if (std::all_of(workers_.begin(), workers_.end(), [](const Worker& each) { return each.isGivenUp; })) {
+    failWithoutSlots(damage);
+  }
+  observer_.warning(givenUpWarning(fmt::format("Worker {}", rank), damage));
+}
+
+std::string RankEvaluator::nameOf(int rank) const {
+  const auto& place = workers_.at(static_cast<std::size_t>(rank - 1)).place;
+  return fmt::format("worker {}{}", rank, place ? " on " + place->host : "");
 }
 
 void RankEvaluator::failWith(int rank, const FailureMessage& failure) const {
-  const auto& place = workers_.at(static_cast<std::size_t>(rank - 1)).place;
   std::string detail = failure.detail;
   if (!detail.empty()) detail += '\n';
-  detail += fmt::format("reported by worker {}{}", rank, place ? " on " + place->host : "");
+  detail += "reported by " + nameOf(rank);
   fatalError(failure.message, detail);
 }
 

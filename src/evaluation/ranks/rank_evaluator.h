@@ -31,6 +31,7 @@ class RankEvaluator final : public Evaluator {
   struct Worker {
     std::optional<ReadyMessage> place;  ///< host and process folder; empty until it is ready
     std::optional<std::size_t> set;     ///< index in the batch of the set that it runs
+    bool isGivenUp = false;             ///< its process folder cannot be used any more
   };
 
   void startOnFreeWorkers();
@@ -38,6 +39,11 @@ class RankEvaluator final : public Evaluator {
   void startNext(int rank);
   void handle(const Message& message);
   void takeResult(int rank, ResultMessage message);
+  /// Throws FatalError if it was the last one.
+  void giveUp(int rank, const GivenUpMessage& message);
+  /// The set that the worker was given, which it then has no longer.
+  std::size_t takeSetOf(int rank);
+  std::string nameOf(int rank) const;
   [[noreturn]] void failWith(int rank, const FailureMessage& failure) const;
   void stopIfCancelled();
   Worker& worker(int rank) { return workers_.at(static_cast<std::size_t>(rank - 1)); }

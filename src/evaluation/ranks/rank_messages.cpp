@@ -37,6 +37,10 @@ struct Layout<KeepFolderMessage> {
   static void of(auto& archive, auto& message) { archive(message.number); }
 };
 template <>
+struct Layout<GivenUpMessage> {
+  static void of(auto& archive, auto& message) { archive(message.what, message.why, message.warnings); }
+};
+template <>
 struct Layout<FailureMessage> {
   static void of(auto& archive, auto& message) { archive(message.message, message.detail); }
 };
@@ -239,6 +243,14 @@ std::string encode(const KeepFolderMessage& message) {
 
 KeepFolderMessage decodeKeepFolder(std::string_view content) {
   return read<KeepFolderMessage>(content);
+}
+
+std::string encode(const GivenUpMessage& message) {
+  return written(message);
+}
+
+GivenUpMessage decodeGivenUp(std::string_view content) {
+  return read<GivenUpMessage>(content);
 }
 
 std::string encode(const FailureMessage& message) {

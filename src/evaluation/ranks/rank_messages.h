@@ -2,6 +2,7 @@
 
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "common/parameter_set.h"
 #include "evaluation/evaluation_result.h"
@@ -17,11 +18,13 @@ namespace mirevo {
 ///     | set -------------------------> |  runs the model                            as often as there are sets
 ///     | <-------------------- result   |
 ///     | keep folder ----------------> |  after a failed run, where its folder is evidence to keep
+///     | <------------------- given up  |  in place of a result: the set is another worker's, as the model has damaged
+///     |                                |  this one's folder once too often; from now on it only waits for stop
 ///     | stop ------------------------> |  at any time; ends its model's processes
 ///     | <------------------ farewell   |  then both leave the job
 ///
 /// A worker that meets a fatal error sends `failure` at any time and waits for `stop`.
-enum class RankMessage : int { begin = 1, set, stop, ready, result, failure, farewell, keepFolder };
+enum class RankMessage : int { begin = 1, set, stop, ready, result, failure, farewell, keepFolder, givenUp };
 
 /// The setup file as the master read it, so that all ranks use the same text.
 struct BeginMessage {
@@ -52,6 +55,13 @@ struct KeepFolderMessage {
   int number = 0;  ///< of the evaluation
 };
 
+/// Why the model cannot be run by a worker any more (FolderDamage), and what the user should know besides.
+struct GivenUpMessage {
+  std::string what;
+  std::string why;
+  std::vector<std::string> warnings;
+};
+
 struct FailureMessage {
   std::string message;
   std::string detail;
@@ -70,6 +80,8 @@ std::string encode(const ResultMessage& message);
 ResultMessage decodeResult(std::string_view content);
 std::string encode(const KeepFolderMessage& message);
 KeepFolderMessage decodeKeepFolder(std::string_view content);
+std::string encode(const GivenUpMessage& message);
+GivenUpMessage decodeGivenUp(std::string_view content);
 std::string encode(const FailureMessage& message);
 FailureMessage decodeFailure(std::string_view content);
 

@@ -70,6 +70,12 @@ void runWorkerLoop(Job& job, ModelRunner& runner) {
       continue;
     }
     if (message.tag != static_cast<int>(RankMessage::set)) refuse(message);
+    if (auto damage = runner.renewIfDamaged(kSlot, warnings)) {
+      sendToMaster(
+          job, RankMessage::givenUp,
+          encode(GivenUpMessage{std::move(damage->what), std::move(damage->why), std::exchange(warnings, {})}));
+      continue;
+    }
     auto result = runModel(job, runner, decodeSet(message.content));
     if (!result) return;
     std::vector<std::string>& told = result->result.warnings;

@@ -28,6 +28,7 @@
 #include "common/run_files.h"
 #include "common/text.h"
 #include "platform/processes/argument_text.h"
+#include "platform/processes/own_files.h"
 #include "platform/processes/process_folder.h"
 
 namespace mirevo {
@@ -105,6 +106,10 @@ std::string printable(std::string_view line) {
   return std::string(trimTrailing(text));
 }
 
+std::string textOf(const FatalError& error) {
+  return error.detail().empty() ? error.message() : error.message() + "\n" + error.detail();
+}
+
 /// What a shell tells with its own codes (POSIX.1-2017, 2.8.2) about the batch file.
 std::string meaningOfCode(int status, const std::string& file) {
   if (status != 126 && status != 127) return {};
@@ -143,6 +148,9 @@ bool PosixProcessLauncher::initialise(const LauncherSettings& settings) {
   ::signal(SIGCHLD, SIG_DFL);
   graceSeconds_ = settings.graceSeconds;
   maxSeconds_ = settings.maxSeconds;
+  baseFolder_ = settings.baseFolder;
+  processFolderPrefix_ = settings.processFolderPrefix;
+  ownFiles_ = settings.ownFiles;
   try {
     std::vector<std::vector<std::string>> arguments;
     for (const BatchItem& item : settings.batchItems) {
@@ -170,7 +178,7 @@ bool PosixProcessLauncher::initialise(const LauncherSettings& settings) {
       prepareSlot(settings, number, arguments);
     }
   } catch (const FatalError& error) {
-    lastError_ = error.message();
+    lastError_ = textOf(error);
     return false;
   } catch (const std::bad_alloc&) {
     lastError_ = std::strerror(ENOMEM);
@@ -210,7 +218,8 @@ void PosixProcessLauncher::prepareSlot(const LauncherSettings& settings, int num
     fatalError(fmt::format("The model's folder {} lies in the process folder {}, which is made anew for every run",
                            settings.baseFolder, slot.folder));
   }
-  makeProcessFolder(settings.baseFolder, slot.folder, settings.processFolderPrefix);
+  makeProcessFolder(baseFolder_, slot.folder, processFolderPrefix_);
+  makeFilesOwn(slot.folder, baseFolder_, ownFiles_, processFolderPrefix_);
   if (!renewLog(slot)) {
     fatalError(fmt::format("Unable to create {}/{}: {}", slot.folder, run_files::kBatchLog, std::strerror(errno)));
   }
@@ -237,6 +246,18 @@ void PosixProcessLauncher::prepareEnvironment(bool useSingleThread) {
   environmentTexts_.emplace_back(mark_.variable());
   for (std::string& text : environmentTexts_) environment_.push_back(text.data());
   environment_.push_back(nullptr);
+}
+
+bool PosixProcessLauncher::renewFolder(int slotNumber) {
+  const std::string& folder = slotAt(slotNumber).folder;
+  try {
+    makeProcessFolderAnew(baseFolder_, folder, processFolderPrefix_);
+    makeFilesOwn(folder, baseFolder_, ownFiles_, processFolderPrefix_);
+  } catch (const FatalError& error) {
+    lastError_ = textOf(error);
+    return false;
+  }
+  return true;
 }
 
 std::string PosixProcessLauncher::getProcessFolder(int slot) const {

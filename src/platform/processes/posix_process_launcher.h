@@ -33,6 +33,7 @@ class PosixProcessLauncher final : public ProcessLauncher {
 
   bool initialise(const LauncherSettings& settings) override;
   const std::string& lastError() const override { return lastError_; }
+  bool renewFolder(int slot) override;
   std::string getProcessFolder(int slot) const override;
   void createProcesses(int slot) override;
   void isExecuting(int slot, std::int32_t& executing, std::int32_t& status) override;
@@ -74,6 +75,9 @@ class PosixProcessLauncher final : public ProcessLauncher {
   std::atomic<pid_t>& groupEntry(const Slot& slot) const;
 
   std::string lastError_;
+  std::string baseFolder_;
+  std::string processFolderPrefix_;
+  std::vector<std::string> ownFiles_;
   FileLock lock_;  ///< on the process folders
   MonotonicClock clock_;
   double graceSeconds_ = 0.0;

@@ -12,6 +12,7 @@
 #include <optional>
 #include <sys/stat.h>
 #include <unistd.h>
+#include <utility>
 #include <vector>
 
 #include <fmt/core.h>
@@ -23,6 +24,7 @@
 #include "common/replaceable_files.h"
 #include "common/run_files.h"
 #include "common/take_text.h"
+#include "platform/processes/leaving_links.h"
 #include "platform/processes/run_made_entries.h"
 
 namespace mirevo {
@@ -94,6 +96,40 @@ void copyFile(const std::string& source, const std::string& target, const struct
   if (!to.close()) fail("write", target, errno);
 }
 
+/// Whether a relative link in a folder, `below` the root, leads to its target without leaving the root.
+bool staysInside(const std::filesystem::path& below, const std::filesystem::path& link) {
+  int depth = 0;
+  for (const std::filesystem::path& way : {below, link}) {
+    for (const std::filesystem::path& part : way) {
+      if (part == "..") {
+        if (--depth < 0) return false;
+      } else if (part != ".") {
+        ++depth;
+      }
+    }
+  }
+  return true;
+}
+
+/// What the copy of the link `source`, below `sourceRoot`, contains, whose own text is `written`.
+std::string linkForCopy(const std::string& source, const std::filesystem::path& written, const std::string& sourceRoot,
+                        const std::string& targetRoot) {
+  const std::filesystem::path folder = std::filesystem::path(source).parent_path();
+  if (written.is_relative() && staysInside(folder.lexically_relative(sourceRoot), written)) {
+    return written.string();
+  }
+  const std::string meant = (folder / written).lexically_normal().string();
+  // The root and the link may name the same folder differently, by way of other links.
+  const std::string real = resolvedPath((folder / written).string());
+  const std::string realRoot = resolvedPath(sourceRoot);
+  for (const auto& [path, root] : {std::pair(&meant, &sourceRoot), std::pair(&real, &realRoot)}) {
+    if (const auto inside = pathInFolder(*path, *root)) {
+      return (std::filesystem::path(targetRoot) / *inside).lexically_normal().string();
+    }
+  }
+  return written.is_absolute() ? written.string() : real;
+}
+
 /// Copies the link `source`, below `sourceRoot`, to `target`.
 void copyLink(const std::string& source, const std::string& target, const std::string& sourceRoot,
               const std::string& targetRoot) {
@@ -102,15 +138,7 @@ void copyLink(const std::string& source, const std::string& target, const std::s
   if (length < 0 && hasVanished(errno)) return;
   if (length < 0) fail("read the link", source, errno);
   const std::string text(buffer.data(), static_cast<std::size_t>(length));
-  const std::filesystem::path written(text);
-  const auto meant = (std::filesystem::path(source).parent_path() / written).lexically_normal();
-  const auto inside = pathInFolder(meant.native(), sourceRoot);
-  std::string content = text;
-  if (written.is_absolute() && inside) {
-    content = (std::filesystem::path(targetRoot) / *inside).lexically_normal().string();
-  } else if (written.is_relative() && !inside) {
-    content = meant.string();
-  }
+  const std::string content = linkForCopy(source, text, sourceRoot, targetRoot);
   if (::symlink(content.c_str(), target.c_str()) != 0) fail("create the link", target, errno);
 }
 
@@ -146,8 +174,9 @@ struct CopiedFolder {
 /// Copies a folder without what runs have made in it; without recursion.
 class FolderCopy final {
  public:
-  FolderCopy(const std::string& source, const std::string& target, std::string_view processFolderPrefix)
-      : source_(source), target_(target), processFolders_(processFolderPrefix) {}
+  /// `isMarked`: the copy gets the mark of a process folder.
+  FolderCopy(const std::string& source, const std::string& target, std::string_view processFolderPrefix, bool isMarked)
+      : source_(source), target_(target), processFolders_(processFolderPrefix), isMarked_(isMarked) {}
 
   void copyAll() {
     pending_ = {""};  // paths below the root, each with its leading "/"
@@ -179,7 +208,7 @@ class FolderCopy final {
     }
     if (::mkdir(to.c_str(), S_IRWXU) != 0) fail("create the folder", to, errno);
     made_.push_back({to, status});
-    if (below.empty()) makeMark(to);
+    if (below.empty() && isMarked_) makeMark(to);
     const bool holdsProcessFolders = processFolders_.liesIn(status);
     const RunMadeEntries runMade(from, *names);
     for (const std::string& name : *names) {
@@ -217,6 +246,7 @@ class FolderCopy final {
   const std::string& source_;
   const std::string& target_;
   ProcessFolderNames processFolders_;
+  bool isMarked_;
   std::vector<std::string> pending_;
   std::vector<CopiedFolder> made_;
 };
@@ -257,6 +287,13 @@ void removeTree(const std::string& root) {
   }
 }
 
+void removeIfPossible(const std::string& root) {
+  try {
+    removeTree(root);
+  } catch (const FatalError&) {  // what is wrong with its disk or modes is told already
+  }
+}
+
 std::string processLockPath(std::string_view processFolderPrefix) {
   return std::string(processFolderPrefix).append(run_files::kProcessLock.extension);
 }
@@ -268,11 +305,24 @@ std::string processFoldersInUse(std::string_view processFolderPrefix, std::strin
       holder, processFolderPrefix);
 }
 
+void copyFolder(const std::string& source, const std::string& target, std::string_view processFolderPrefix) {
+  FolderCopy(source, target, processFolderPrefix, false).copyAll();
+}
+
 void makeProcessFolder(const std::string& source, const std::string& target, std::string_view processFolderPrefix) {
   const std::string why = whyNotReplaceable(target, run_files::kProcessFolder);
   if (!why.empty()) fatalError(fmt::format("{} has the name of a process folder. {}", target, why));
+  makeProcessFolderAnew(source, target, processFolderPrefix);
+}
+
+void makeProcessFolderAnew(const std::string& source, const std::string& target, std::string_view processFolderPrefix) {
   removeTree(target);
-  FolderCopy(source, target, processFolderPrefix).copyAll();
+  try {
+    FolderCopy(source, target, processFolderPrefix, true).copyAll();
+  } catch (const FatalError&) {
+    removeIfPossible(target);
+    throw;
+  }
 }
 
 }  // namespace mirevo

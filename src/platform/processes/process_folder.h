@@ -15,10 +15,14 @@ std::string processFoldersInUse(std::string_view processFolderPrefix, std::strin
 /// reason.
 void removeTree(const std::string& root);
 
+/// The same for what a failure leaves half made; keeps silent if that cannot be removed.
+void removeIfPossible(const std::string& root);
+
 /// Makes `target` a fresh copy of the folder `source`, with a mark (run_files::kFolderMark): an existing `target` is
 /// removed, unless it is not a process folder (whyNotReplaceable()); files (sharing blocks with the original if the
 /// file system can), folders and links are copied with their modes and times, sockets and devices are not. Both paths
 /// are absolute. A link to a target inside `source` leads into the copy, one to a target outside leads there as before.
+/// What was copied before a failure is removed.
 ///
 /// What runs have made in `source` is left out (RunMadeEntries): the logs, results and saved files of setups beside the
 /// model; the process folders of this run, `processFolderPrefix` followed by a number, and those of other runs,
@@ -26,5 +30,11 @@ void removeTree(const std::string& root);
 ///
 /// Throws FatalError with a line that names the path and the system's reason.
 void makeProcessFolder(const std::string& source, const std::string& target, std::string_view processFolderPrefix);
+
+/// The same without a look at what `target` is: for a process folder of this run, whatever a model has made of it.
+void makeProcessFolderAnew(const std::string& source, const std::string& target, std::string_view processFolderPrefix);
+
+/// Copies the folder `source` in the same way to `target`, where nothing is, and without the mark.
+void copyFolder(const std::string& source, const std::string& target, std::string_view processFolderPrefix);
 
 }  // namespace mirevo

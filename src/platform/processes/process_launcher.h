@@ -15,9 +15,10 @@ struct BatchItem {
 };
 
 struct LauncherSettings {
-  std::string baseFolder;             ///< absolute; folder of the first batch file; copied, never written to
-  std::string processFolderPrefix;    ///< absolute; the slot's folder without its number, which follows
-  std::vector<BatchItem> batchItems;  ///< at least one
+  std::string baseFolder;                  ///< absolute; folder of the first batch file; copied, never written to
+  std::string processFolderPrefix;         ///< absolute; the slot's folder without its number, which follows
+  std::vector<BatchItem> batchItems;       ///< at least one
+  std::vector<std::string> ownFiles = {};  ///< below the base folder, with their leading "/": in no other slot's folder
   int slotCount = 1;
   int firstFolderNumber = 1;                        ///< number of the folder of slot 1; those of the other slots follow
   bool useSingleThread = false;                     ///< sets the usual thread-count variables to 1 for the model
@@ -58,9 +59,14 @@ class ProcessLauncher {
   ProcessLauncher& operator=(const ProcessLauncher&) = delete;
   virtual ~ProcessLauncher() = default;
 
-  /// Makes every slot's process folder a fresh copy of the base folder. False when that fails; lastError() says why.
+  /// Makes every slot's process folder a fresh copy of the base folder, with each of the own files in it or nowhere.
+  /// False when that fails; lastError() says why.
   virtual bool initialise(const LauncherSettings& settings) = 0;
   virtual const std::string& lastError() const = 0;
+
+  /// Makes the process folder of a slot that runs nothing once more such a copy, whatever has become of it. False when
+  /// that fails; lastError() says why.
+  virtual bool renewFolder(int slot) = 0;
 
   /// Absolute path of the slot's folder, without a trailing separator.
   virtual std::string getProcessFolder(int slot) const = 0;

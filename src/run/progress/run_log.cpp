@@ -86,8 +86,14 @@ void RunLog::write(std::string_view record) {
   }
   putBackIfRemoved(descriptor_, path_);  // if that fails, the log and the run go on all the same
   // What a model prints and what files are called may be in any encoding.
-  const int error = writeWhole(descriptor_, withValidUtf8(record)).error;
-  if (error != 0 && writeError_.empty()) writeError_ = std::strerror(error);
+  const std::string text = unwrittenHead_ + withValidUtf8(record);
+  const int error = writeWhole(descriptor_, text).error;
+  if (error == 0) {
+    unwrittenHead_.clear();
+    return;
+  }
+  if (writeError_.empty()) writeError_ = std::strerror(error);
+  if (unwrittenHead_.empty() && ::lseek(descriptor_, 0, SEEK_END) == 0) unwrittenHead_ = record;
 }
 
 }  // namespace mirevo

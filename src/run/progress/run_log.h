@@ -61,7 +61,8 @@ class RunLog final {
   int descriptor_ = -1;
   bool isClosed_ = false;
   std::string path_;
-  std::string pending_;  ///< lines written before the file was open
+  std::string pending_;        ///< lines written before the file was open
+  std::string unwrittenHead_;  ///< the first record, by which a log is known as one, while the disk has no room for it
   std::function<void(std::string_view)> listener_;
   std::vector<std::string> warnings_;
   int warningCount_ = 0;

@@ -164,5 +164,30 @@ TEST_F(RankEvaluatorTest, TheWorkerOfAnEarlyFailureIsToldToKeepItsFolder) {
   EXPECT_EQ(decodeKeepFolder(job_.sent[1].content).number, 1);
 }
 
+TEST_F(RankEvaluatorTest, TheSetOfAWorkerThatIsGivenUpIsAnothersUntilNoneIsLeft) {
+  const std::string damage = encode(GivenUpMessage{"Unable to open x", "no such file", {"x was made anew"}});
+  RankEvaluator& master = makeMaster();
+  becomeReady(1);
+  becomeReady(2);
+  job_.deliver(1, RankMessage::givenUp, damage);
+  answerLargestFirst();
+  // The first worker runs nothing of what follows, though it is free.
+  job_.onSend = [this, known = job_.onSend](const Message& message) {
+    known(message);
+    if (message.rank == 1) running_.erase(1);
+  };
+  EXPECT_THAT(measuresOf(evaluate(master, {4.0, 2.0, 3.0})), ElementsAre(3.0, 1.0, 2.0));
+  EXPECT_THAT(
+      observer_.events,
+      testing::IsSupersetOf({"warning: x was made anew",
+                             "warning: Worker 1 is given up and runs no model any more, as its process folder "
+                             "was damaged again. Unable to open x: no such file; reported by worker 1 on node"}));
+  job_.onReceive = nullptr;
+  job_.deliver(2, RankMessage::givenUp, damage);
+  EXPECT_THAT(refusalOf([&] { evaluate(master, {5.5}); }),
+              StartsWith("Error: Unable to open x\nno such file; reported by worker 2 on node\nno process folder is "
+                         "left"));
+}
+
 }  // namespace
 }  // namespace mirevo

@@ -92,6 +92,22 @@ TEST_F(RankWorkerTest, AWarningIsToldOnceWithTheNextResultThere) {
   EXPECT_THAT(warningsOf(4), IsEmpty());
 }
 
+TEST_F(RankWorkerTest, AFolderThatIsDamagedAgainIsToldInPlaceOfAResult) {
+  FakeLauncher launcher([](int, const std::string&) {
+    return FakeLauncher::Batch{.write = [](const std::string& folder) {
+      std::ofstream(folder + "/simulated.csv") << series(2.0);
+      std::filesystem::remove(folder + "/parameters.txt");
+    }};
+  });
+  makeRunner(launcher, 1);
+  sets_ = {2.0, 2.0, 2.0};
+  runWorkerLoop(job_, *runner_);
+  ASSERT_THAT(sentTags(),
+              ElementsAre(RankMessage::ready, RankMessage::result, RankMessage::result, RankMessage::givenUp));
+  EXPECT_THAT(warningsOf(2), ElementsAre(HasSubstr("was made anew")));
+  EXPECT_EQ(decodeGivenUp(job_.sent[3].content).what, "Unable to open " + (folder_ / "run_Process1/parameters.txt"));
+}
+
 TEST_F(RankWorkerTest, StopEndsAModelThatRuns) {
   sets_ = {2.0, 2.0, 2.0};
   job_.onReceive = [this](double) {

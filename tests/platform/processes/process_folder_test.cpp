@@ -1,11 +1,14 @@
 #include "platform/processes/process_folder.h"
 
+#include <csignal>
 #include <fcntl.h>
 #include <iterator>
 #include <map>
 #include <sstream>
 #include <string>
+#include <sys/resource.h>
 #include <sys/stat.h>
+#include <system_error>
 #include <tuple>
 #include <unistd.h>
 
@@ -13,6 +16,8 @@
 #include <gtest/gtest.h>
 
 #include "common/run_files.h"
+#include "platform/processes/folder_room.h"
+#include "refusal.h"
 #include "temporary_folder.h"
 
 namespace mirevo {
@@ -76,6 +81,9 @@ TEST(ProcessFolder, LinksLeadWhereTheyShould) {
   fs::create_symlink(folder / "setup/model/shared/y.txt", base + "/outside_absolute");
   fs::create_symlink("nowhere", base + "/dangling");
   fs::create_symlink(".", base + "/data/loop");
+  fs::create_symlink("../../base/data", base + "/data/around");
+  fs::create_directory_symlink(base, folder / "way");
+  fs::create_symlink(folder / "way/data", base + "/spelt_otherwise");
 
   const std::string copy = folder / "setup/run_Process1";
   makeProcessFolder(base, copy, folder / "setup/run_Process");
@@ -85,8 +93,37 @@ TEST(ProcessFolder, LinksLeadWhereTheyShould) {
                                                         {"/outside_relative", folder / "setup/model/shared/y.txt"},
                                                         {"/outside_absolute", folder / "setup/model/shared/y.txt"},
                                                         {"/dangling", "nowhere"},
-                                                        {"/data/loop", "."}};
+                                                        {"/data/loop", "."},
+                                                        {"/data/around", copy + "/data"},
+                                                        {"/spelt_otherwise", copy + "/data"}};
   for (const auto& [name, target] : cases) EXPECT_EQ(fs::read_symlink(copy + name).string(), target) << name;
+}
+
+TEST(ProcessFolder, WhatWasCopiedBeforeAFailureIsRemoved) {
+  const TemporaryFolder folder;
+  folder.write("base/a.txt", "a");
+  fs::create_symlink("a.txt", folder / "base/link");
+  folder.write("base/z.bin", std::string(100'000, 'z'));
+  const auto before = std::signal(SIGXFSZ, SIG_IGN);
+  rlimit limit{};
+  ::getrlimit(RLIMIT_FSIZE, &limit);
+  const rlimit small{50'000, limit.rlim_max};
+  ::setrlimit(RLIMIT_FSIZE, &small);
+  const std::string refusal =
+      refusalOf([&] { makeProcessFolder(folder / "base", folder / "run_Process1", folder / "run_Process"); });
+  ::setrlimit(RLIMIT_FSIZE, &limit);
+  std::signal(SIGXFSZ, before);
+  EXPECT_EQ(refusal, "Unable to write " + (folder / "run_Process1/z.bin") + ": File too large");
+  EXPECT_FALSE(folder.exists("run_Process1"));
+}
+
+TEST(ProcessFolder, ACopyLeavesRoomForTheModelRuns) {
+  const TemporaryFolder folder;
+  folder.write("base/in/run.sh", "");
+  std::error_code failed;
+  EXPECT_EQ(extentOf(folder / "base", failed).entries, 3U);
+  EXPECT_EQ(whyNoRoom(folder / "base", folder.path(), 1), "");
+  EXPECT_THAT(whyNoRoom(folder / "base", folder.path(), 2'000'000'000), testing::StartsWith("it needs 0.0 MB of the "));
 }
 
 // A setup that lies in the model's own folder has what its runs make in what it copies.

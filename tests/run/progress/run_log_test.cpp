@@ -1,5 +1,7 @@
 #include "run/progress/run_log.h"
 
+#include <csignal>
+#include <sys/resource.h>
 #include <unistd.h>
 
 #include <gtest/gtest.h>
@@ -41,6 +43,22 @@ TEST_F(RunLogTest, WarningsAreCountedKeptAndPassedOn) {
   EXPECT_EQ(log_.warnings().front(), "early");
   EXPECT_EQ(heard.size(), 20U);
   EXPECT_EQ(heard.front(), "Warning: 1");
+}
+
+TEST_F(RunLogTest, AHeadThatTheDiskHadNoRoomForComesLater) {
+  ASSERT_TRUE(log_.open(path_, reason_)) << reason_;
+  const auto before = std::signal(SIGXFSZ, SIG_IGN);
+  rlimit limit{};
+  ::getrlimit(RLIMIT_FSIZE, &limit);
+  const rlimit none{0, limit.rlim_max};
+  ::setrlimit(RLIMIT_FSIZE, &none);
+  log_.line("Mirevo 1.2");
+  log_.line("lost");
+  ::setrlimit(RLIMIT_FSIZE, &limit);
+  std::signal(SIGXFSZ, before);
+  for (const char* text : {"Error", "end"}) log_.line(text);
+  EXPECT_EQ(content(), "Mirevo 1.2\nError\nend\n");
+  EXPECT_EQ(log_.writeError(), "File too large");
 }
 
 TEST_F(RunLogTest, RecordsOfAnotherWriterAreNotOverwritten) {
