@@ -46,6 +46,17 @@ std::optional<RunRecord> readRecord(const std::string& path, std::string& fault)
   return record;
 }
 
+void checkRowsOf(const std::string& checksumFile, const RunConfig& config, RunSources& sources) {
+  std::error_code ignored;
+  std::string reason;
+  const auto text = readTextFile(checksumFile, reason);
+  if (!text && std::filesystem::exists(checksumFile, ignored)) {
+    sources.checksumFault = fmt::format("{}: {}", fileNameOf(checksumFile), reason);
+  }
+  sources.rowFaults =
+      checkRows(sources.results.rows, readRowChecksums(text.value_or("")), config, RowOrigin::perhapsOther).faults;
+}
+
 }  // namespace
 
 std::optional<RunSources> readRunSources(const RunConfig& config, const SearchSpace& space,
@@ -63,7 +74,6 @@ std::optional<RunSources> readRunSources(const RunConfig& config, const SearchSp
   }
   RunSources sources;
   sources.results = readResultTable(*text, resultColumns(config, space));
-  putInOrder(sources.results.rows);
   auto record = readRecord(runFilePath(filePrefix, names->record), sources.recordFault);
   const bool isGoingOn = FileLock::isHeld(runFilePath(filePrefix, run_files::kRunLock));
   if (record && !record->stage && !isGoingOn && !sources.results.closingLines.empty()) {
@@ -76,6 +86,8 @@ std::optional<RunSources> readRunSources(const RunConfig& config, const SearchSp
   }
   sources.record = *std::move(record);
   sources.stage = sources.record.stage.value_or(isGoingOn ? RunStage::running : RunStage::cutOff);
+  if (sources.stage != RunStage::running) checkRowsOf(runFilePath(filePrefix, names->checksums), config, sources);
+  putInOrder(sources.results.rows);
   if (sources.stage == RunStage::running) return sources;
   sources.ended = sources.record.ended.empty() ? timeOfFile(path) : sources.record.ended;
   return sources;

@@ -61,6 +61,7 @@ RunResults::RunResults(const RunConfig& config, const SearchSpace& space, const 
       columns_(resultColumns(config, space)),
       names_(namesOf(config)),
       files_(restartFiles(filePrefix, names_)),
+      table_(files_.checksums, tableHead_),
       failedRuns_({pathBeside(filePrefix, run_files::kFailedRuns), files_.failures}, config.setupName, space.names,
                   tableHead_),
       pairs_(files_.pairs, tableHead_),
@@ -107,7 +108,7 @@ std::vector<std::string> RunResults::bandPaths(const RunConfig& config) const {
 std::vector<RunFile> RunResults::dataFiles(const RunConfig& config) {
   const ResultFileNames& names = namesOf(config);
   std::vector<RunFile> files{names.results,  names.restart, names.simulatedValues, names.record,
-                             names.failures, names.pairs,   run_files::kSeries};
+                             names.failures, names.pairs,   names.checksums,       run_files::kSeries};
   files.insert(files.end(), names.tables.begin(), names.tables.end());
   return files;
 }
@@ -158,7 +159,7 @@ void RunResults::keepEarlierFiles(const RunConfig& config, RunLog& log) const {
     log.line("The results of the earlier run were kept as " + kept);
   }
   for (const std::string& path :
-       {files_.settings, files_.simulatedValues, files_.record, files_.failures, files_.pairs}) {
+       {files_.settings, files_.simulatedValues, files_.record, files_.failures, files_.pairs, files_.checksums}) {
     keepEarlierResults(path, config.setupFile, log);
   }
   for (const RunFile& table : names_.tables) {
