@@ -154,7 +154,7 @@ void tryDamages(const RunSettings& settings, bool isLong, FaultReport& report) {
   run.startFromHere();
   std::string whole = run.folder().read(run.resultFileName());
   whole.resize(whole.find("\n# ", whole.find("\n1\t")) + 1);
-  for (const int number : isLong ? std::vector{2, 5} : std::vector{2}) {
+  for (const int number : isLong ? std::vector{2, 4} : std::vector{2}) {
     const std::size_t begin = whole.find(fmt::format("\n{}\t", number)) + 1;
     const std::string row = whole.substr(begin, whole.find('\n', begin) + 1 - begin);
     for (const Damage& damage :
