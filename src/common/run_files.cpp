@@ -11,8 +11,8 @@ std::vector<RunFile> filesOfSetup() {
                              kReport,  kBand,           kSavedFolder,  kFailedFolder, kProcessFolder,
                              kRunLock, kProcessLock,    kOwnFailedRuns};
   for (const ResultFileNames& names : {kPlain, kSensitivity, kOptimisation}) {
-    files.insert(files.end(),
-                 {names.results, names.restart, names.simulatedValues, names.record, names.failures, names.pairs});
+    files.insert(files.end(), {names.results, names.restart, names.simulatedValues, names.record, names.failures,
+                               names.pairs, names.checksums});
     files.insert(files.end(), names.tables.begin(), names.tables.end());
   }
   return files;

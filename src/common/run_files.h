@@ -30,6 +30,7 @@ struct ResultFileNames {
   RunFile record;                   ///< the account of the run
   RunFile failures;                 ///< why evaluations failed
   RunFile pairs;                    ///< how many observations the first successful run and runs with fewer meet
+  RunFile checksums;                ///< of the rows of the table of evaluations
   std::span<const RunFile> tables;  ///< in which the task gives what it found
 };
 
@@ -74,19 +75,17 @@ constexpr RunFile simulatedFile(std::string_view stem) {
 }
 
 /// Scenario runs and the uncertainty analysis.
-inline constexpr ResultFileNames kPlain{{"", ".dat", false, true},
-                                        restartFile("_Restart"),
-                                        simulatedFile("_Simulated"),
-                                        {"_Run", ".dat", false, true},
-                                        {"_Failures", ".dat", false, true},
-                                        {"_Pairs", ".dat", false, true},
-                                        kUncertaintyTables};
+inline constexpr ResultFileNames kPlain{{"", ".dat", false, true},           restartFile("_Restart"),
+                                        simulatedFile("_Simulated"),         {"_Run", ".dat", false, true},
+                                        {"_Failures", ".dat", false, true},  {"_Pairs", ".dat", false, true},
+                                        {"_Checksums", ".dat", false, true}, kUncertaintyTables};
 inline constexpr ResultFileNames kSensitivity{{"_Sensitivity", ".dat"},
                                               restartFile("_Sensitivity_Restart"),
                                               simulatedFile("_Sensitivity_Simulated"),
                                               {"_Sensitivity_Run", ".dat"},
                                               {"_Sensitivity_Failures", ".dat"},
                                               {"_Sensitivity_Pairs", ".dat"},
+                                              {"_Sensitivity_Checksums", ".dat"},
                                               kSensitivityTables};
 inline constexpr ResultFileNames kOptimisation{{"_Optimisation", ".dat"},
                                                restartFile("_Optimisation_Restart"),
@@ -94,6 +93,7 @@ inline constexpr ResultFileNames kOptimisation{{"_Optimisation", ".dat"},
                                                {"_Optimisation_Run", ".dat"},
                                                {"_Optimisation_Failures", ".dat"},
                                                {"_Optimisation_Pairs", ".dat"},
+                                               {"_Optimisation_Checksums", ".dat"},
                                                {}};
 
 inline constexpr std::string_view kFailuresMark = "# Failed evaluations of ";

@@ -53,6 +53,7 @@ class ReportBuilder final {
  private:
   void addRun();
   void noteChangedSetup();
+  void noteRowFaults();
   void addEvaluations();
   void findBestAndInitial();
   void addMeasures();
@@ -105,6 +106,7 @@ ReportData ReportBuilder::build() {
     if (table.hasHeader) note("The results are left out: they have other columns than the setup as it is now.");
     table.rows.clear();
   }
+  noteRowFaults();
   addEvaluations();
   findBestAndInitial();
   data_.parameters = reportedParameters(config_, parameters_, best_);
@@ -114,6 +116,23 @@ ReportData ReportBuilder::build() {
   addSeries();
   addAnalyses();
   return std::move(data_);
+}
+
+void ReportBuilder::noteRowFaults() {
+  constexpr std::size_t kMostShown = 5;
+  if (!sources_.checksumFault.empty()) {
+    note(fmt::format("Whether rows were changed is not known: {}.", sources_.checksumFault));
+  }
+  const std::vector<RowFault>& faults = sources_.rowFaults;
+  if (faults.empty() || sources_.results.rows.empty()) return;
+  std::string lines;
+  for (std::size_t i = 0; i < std::min(faults.size(), kMostShown); ++i) {
+    lines += fmt::format("{}{}", i == 0 ? "" : "; ", rowFaultText(faults[i]));
+  }
+  if (faults.size() > kMostShown) lines += fmt::format("; and {} more", faults.size() - kMostShown);
+  note(fmt::format("{} of the result file {} not hold, but {} shown: {}.",
+                   faults.size() == 1 ? "1 row" : fmt::format("{} rows", faults.size()),
+                   faults.size() == 1 ? "does" : "do", faults.size() == 1 ? "is" : "are", lines));
 }
 
 void ReportBuilder::addRun() {

@@ -63,6 +63,17 @@ std::string ofAnotherTask(const std::string& path, const std::string& key, const
       path, other == all.end() ? std::string_view(key) : (*other)->facts().longName, wanted.facts().longName, setting);
 }
 
+void checkRowsOf(const std::string& checksumFile, const RunConfig& config, RunSources& sources) {
+  std::error_code ignored;
+  std::string reason;
+  const auto text = readTextFile(checksumFile, reason);
+  if (!text && std::filesystem::exists(checksumFile, ignored)) {
+    sources.checksumFault = fmt::format("{}: {}", fileNameOf(checksumFile), reason);
+  }
+  sources.rowFaults =
+      checkRows(sources.results.rows, readRowChecksums(text.value_or("")), config, RowOrigin::perhapsOther).faults;
+}
+
 }  // namespace
 
 std::optional<RunSources> readRunSources(const RunConfig& config, const SearchSpace& space,
@@ -85,7 +96,6 @@ std::optional<RunSources> readRunSources(const RunConfig& config, const SearchSp
     reason = path + ": it holds no evaluation, so there is nothing to report";
     return std::nullopt;
   }
-  putInOrder(sources.results.rows);
   auto record = readRecord(runFilePath(filePrefix, names->record), sources.recordFault);
   if (record && !record->task.empty() && record->task != config.task->facts().name.name) {
     reason = ofAnotherTask(path, record->task, *config.task);
@@ -102,6 +112,8 @@ std::optional<RunSources> readRunSources(const RunConfig& config, const SearchSp
   }
   sources.record = *std::move(record);
   sources.stage = sources.record.stage.value_or(isGoingOn ? RunStage::running : RunStage::cutOff);
+  if (sources.stage != RunStage::running) checkRowsOf(runFilePath(filePrefix, names->checksums), config, sources);
+  putInOrder(sources.results.rows);
   if (sources.stage == RunStage::running) return sources;
   sources.ended = sources.record.ended.empty() ? timeOfFile(path) : sources.record.ended;
   return sources;

@@ -9,6 +9,7 @@
 #include "run/results/pairs_file.h"
 #include "run/results/restart_settings.h"
 #include "run/results/result_table.h"
+#include "run/results/row_check.h"
 #include "run/results/run_record.h"
 #include "run/results/series_table.h"
 #include "run/setup/run_config.h"
@@ -22,7 +23,10 @@ struct RunSources {
   RunRecord record;
   std::string recordFault;  ///< why the record cannot be read; empty if it can, or if none was written
   RunStage stage = RunStage::running;
-  std::string ended;  ///< empty while the run goes on
+  std::string ended;                ///< empty while the run goes on
+  std::vector<RowFault> rowFaults;  ///< of rows that are damaged or were changed; none while the run goes on
+  std::string
+      checksumFault;  ///< why the checksums of the rows cannot be read; empty if they can, or if none were written
 };
 
 /// A file that may be absent.

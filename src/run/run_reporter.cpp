@@ -57,6 +57,8 @@ void RunReporter::evaluationFinished(std::span<const double> set, const Evaluati
 void RunReporter::evaluationReplayed(std::span<const double> set, const EvaluationResult& result) {
   ++replayedCount_;
   state_.progress.progressReplayed(result.number, result.ok());
+  // It is computed again from the objective functions; what the earlier run's file says need not be true.
+  if (result.ok() && !std::isnan(result.aggregate)) results_.replaceAggregate(result.number, result.aggregate);
   const std::vector<double> values = ToModelScale(space_, set);
   count(values, result, {});
   if (!result.shownSeries.empty()) {

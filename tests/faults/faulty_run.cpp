@@ -21,13 +21,14 @@ const std::vector<std::string>& earlierFiles() {
                                                  "basin_Failures.dat",
                                                  "basin_Quantiles.dat",
                                                  "basin_Optimisation_Failures.dat",
+                                                 "basin_Optimisation_Checksums.dat",
                                                  "basin_Sensitivity_Run.dat",
                                                  "basin_Saved/1/a.csv",
                                                  "basin_Process1/mirevo_batch.log",
                                                  "basin._kill_"};
   return names;
 }
-constexpr std::size_t kKeptEarlierFiles = 12;
+constexpr std::size_t kKeptEarlierFiles = 13;
 
 /// With the marks of all of a run's files, or the program would not touch it.
 std::string earlierContent(const std::string& name) {
@@ -130,7 +131,7 @@ std::map<std::string, std::string> FaultyRun::outputs() const {
   const std::string failures = resultFileName_.substr(0, resultFileName_.rfind('.')) + "_Failures.dat";
   for (const std::string& name :
        {std::string("calSimErr.dat"), failures, std::string("basin_Band_1.csv"), std::string("basin_Quantiles.dat"),
-        std::string("basin_Covariance.dat"), resultFileName_}) {
+        std::string("basin_Covariance.dat"), checksumFileName(), resultFileName_}) {
     if (folder_.exists(name)) found[name] = withoutDates(folder_.read(name));
   }
   if (!folder_.exists("basin_Saved")) return found;

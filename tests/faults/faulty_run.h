@@ -37,6 +37,9 @@ class FaultyRun {
   const ModelFolder& folder() const { return folder_; }
   std::string setup() const { return folder_ / "basin.kdx"; }
   const std::string& resultFileName() const { return resultFileName_; }
+  std::string checksumFileName() const {
+    return resultFileName_.substr(0, resultFileName_.rfind('.')) + "_Checksums.dat";
+  }
 
   /// The environment in which a run of the setup takes the faults that `more` describes: see fault_injector.cpp.
   Environment injection(Environment more) const;

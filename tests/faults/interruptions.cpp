@@ -1,4 +1,5 @@
 #include <algorithm>
+#include <optional>
 #include <random>
 #include <span>
 
@@ -90,6 +91,96 @@ void tryCuts(const RunSettings& settings, bool isLong, FaultReport& report) {
   }
 }
 
+std::string replaced(std::string text, const std::string& from, const std::string& to) {
+  const auto at = text.find(from);
+  return at == std::string::npos ? text : text.replace(at, from.size(), to);
+}
+
+/// A result file or its checksums as a disk, a person or another program may leave them.
+struct Damage {
+  std::string what;
+  std::string results;
+  std::optional<std::string> checksums;  ///< none: the file is gone
+  std::string refusal = {};              ///< what the restart ends with; empty: it takes up what is left
+  std::string repaired = {};             ///< the results with which it then goes on
+};
+
+/// `row` is the line of a row in `whole`, the results without their closing lines; `sums` are the checksums.
+/// `isScaled`: the initial sample determines the scale of the aggregate.
+std::vector<Damage> damagesOf(const std::string& whole, const std::string& row, const std::string& sums,
+                              bool isScaled) {
+  const std::string first = row.substr(0, row.find('\t') + 1);
+  const auto lineCount = std::count(whole.begin(), whole.begin() + static_cast<std::ptrdiff_t>(whole.find(row)), '\n');
+  const std::string where = fmt::format("line {} (evaluation No. {}): ", lineCount + 1, std::stoi(row));
+  const std::string without = replaced(whole, row, "");
+  const std::string sum = sums.substr(sums.find("\n" + first) + 1, first.size() + 17);
+  const auto with = [&](const std::string& other) { return replaced(whole, row, other); };
+  std::vector<Damage> damages = {
+      {"a row is missing", without, sums},
+      {"a row is cut off, with a line end", with(row.substr(0, row.size() / 2) + "\n"), sums},
+      {"a row of zero bytes", with(std::string(row.size() - 1, '\0') + "\n"), sums},
+      {"line ends of another system", with(row.substr(0, row.size() - 1) + "\r\n"), sums},
+      {"a row twice", whole + row, sums, fmt::format("(evaluation No. {}): the evaluation is in line", std::stoi(row)),
+       whole},
+      {"another number", with("99999\t" + row.substr(first.size())), sums, "(evaluation No. 99999): it has no checksum",
+       without},
+      {"a checksum is missing", whole, replaced(sums, sum, ""), where + "it has no checksum", without},
+      {"checksums are cut off", whole, sums.substr(0, sums.size() - 9)},
+      {"checksums are cut off in their head", whole, sums.substr(0, 5)},
+      {"checksums are damaged", whole, replaced(sums, "Checksum\n", "Check\n")},
+      {"no checksums", whole, {}}};
+  const bool isOk = row.starts_with(first + "OK\t");
+  const std::string failed = first + "FAILED" + row.substr(row.find('\t', first.size()));
+  damages.push_back({"another status", with(failed), sums, isOk ? where + "it is not as it was written" : "", without});
+  if (isOk) damages.push_back({"another status, no checksums", with(failed), {}, where + "its status is", without});
+  for (std::size_t begin = row.find('\t', first.size()) + 1; begin < row.size();) {
+    const std::size_t end = row.find_first_of("\t\n", begin);
+    const std::string other = with(std::string(row).replace(begin, end - begin, "0.123"));
+    damages.push_back({"another value", other, sums, where + "it is not as it was written", without});
+    if (isOk && end == row.rfind('\t')) {
+      damages.push_back({"another value, no checksums", other, {}, where + "objective function \"", without});
+    } else if (isOk && row[end] == '\n') {
+      damages.push_back(
+          {"another aggregate, no checksums", other, {}, isScaled ? "" : where + "the aggregate is", without});
+    }
+    begin = end + 1;
+  }
+  return damages;
+}
+
+void tryDamages(const RunSettings& settings, bool isLong, FaultReport& report) {
+  FaultyRun run(settings);
+  run.makeReference();
+  run.startFromHere();
+  std::string whole = run.folder().read(run.resultFileName());
+  whole.resize(whole.find("\n# ", whole.find("\n1\t")) + 1);
+  for (const int number : isLong ? std::vector{2, 4} : std::vector{2}) {
+    const std::size_t begin = whole.find(fmt::format("\n{}\t", number)) + 1;
+    const std::string row = whole.substr(begin, whole.find('\n', begin) + 1 - begin);
+    for (const Damage& damage :
+         damagesOf(whole, row, run.folder().read(run.checksumFileName()), settings.aggregation != 0)) {
+      run.reset();
+      run.folder().write(run.resultFileName(), damage.results);
+      run.folder().write(run.checksumFileName(), damage.checksums.value_or(""));
+      if (!damage.checksums) std::filesystem::remove(run.folder() / run.checksumFileName());
+      ProgramResult result = run.run({});
+      std::vector<std::string> problems;
+      if (!damage.refusal.empty()) {
+        if (result.exitCode != 1 || result.error.find(damage.refusal) == std::string::npos) {
+          problems.push_back(fmt::format("not refused, exit code {}: {}", result.exitCode, result.error));
+        }
+        const bool isUntouched = run.folder().read(run.resultFileName()) == damage.results;
+        if (!isUntouched) problems.push_back("the refused results were changed");
+        run.folder().write(run.resultFileName(), damage.repaired);
+        result = run.run({});
+      }
+      if (result.exitCode != 0) problems.push_back(fmt::format("exit code {}: {}", result.exitCode, result.error));
+      report.tried("result file damaged", fmt::format("{}: {}, row {}", nameOf(settings), damage.what, number),
+                   problems, run.checkOutputs());
+    }
+  }
+}
+
 void tryStops(int count, FaultReport& report) {
   FaultyRun run(kRuns[2]);
   run.makeReference();
@@ -125,6 +216,9 @@ void tryInterruptions(bool isLong, FaultReport& report) {
   for (const RunSettings& settings : std::span(kRuns).first(4)) {
     tryKills(settings, isLong ? 25 : 1, report);
     tryCuts(restarting(settings), isLong, report);
+  }
+  for (const RunSettings& settings : isLong ? std::span(kRuns) : std::span(kRuns).subspan(4, 1)) {
+    tryDamages(restarting(settings), isLong, report);
   }
   tryStops(isLong ? 40 : 3, report);
   tryClocks(report);

@@ -8,6 +8,7 @@
 #include "run/results/failure_table.h"
 #include "run/results/pairs_file.h"
 #include "run/results/restart_settings.h"
+#include "run/results/row_checksums.h"
 #include "run/results/run_record.h"
 #include "run/results/series_table.h"
 
@@ -30,6 +31,14 @@ std::string failureText(std::string_view text) {
   return rows;
 }
 
+std::string checksumText(std::string_view text) {
+  std::string rows = "Evaluation\tChecksum\n";
+  for (const auto& [number, checksum] : mirevo::readRowChecksums(text)) {
+    rows += mirevo::rowChecksumText({number, checksum});
+  }
+  return rows;
+}
+
 }  // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
@@ -41,6 +50,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
   }
   require(recordText(recordText(text)) == recordText(text));
   require(failureText(failureText(text)) == failureText(text));
+  require(checksumText(checksumText(text)) == checksumText(text));
   mirevo::readSeriesTable(text);
   mirevo::readPairsTable(text);
   if (const auto settings = mirevo::parseRestartSettings(text)) {

@@ -88,6 +88,14 @@ TEST(Report, OfARunThatGoesOnOrWasCutOffSaysSoAndLeavesItsFilesAlone) {
   EXPECT_THAT(reportData(folder),
               AllOf(HasSubstr(R"("state":"cut off")"), HasSubstr("1 line of the result file is cut off"),
                     HasSubstr(R"("evaluations":1,)")));
+  const std::string row = "\n1\tOK\t1\t";
+  folder.write("basin.dat", std::string(results).replace(results.find(row), row.size(), "\n1\tOK\t1.5\t"));
+  EXPECT_EQ(makeReport(folder).exitCode, 0);
+  EXPECT_THAT(reportData(folder),
+              AllOf(::testing::ContainsRegex(
+                        "1 row of the result file does not hold, but is shown: line [0-9]+ \\(evaluation No. "
+                        "1\\): it is not as it was written"),
+                    HasSubstr(R"("evaluations":1,)")));
 }
 
 TEST(Report, OfASensitivityAnalysisThatGoesOnSaysOfHowManyEvaluationsItsDerivativesAre) {

@@ -38,7 +38,7 @@ class RunReporterTest : public ::testing::Test {
   TemporaryFolder folder_;
   RunState state_;
   SearchSpace space_{{"k"}, {0.0}, {0.0}, {10.0}, {TransformationType::logarithmic}};
-  ResultFile results_;
+  ResultFile results_{folder_ / "s_Checksums.dat", {"Title"}};
   FailedRunFile failedRuns_{{folder_ / "calSimErr.dat", folder_ / "s_Failures.dat"}, "s", {"k"}, {"Title"}};
   PairsFile pairs_{folder_ / "s_Pairs.dat", {"Title"}};
   RunReporter reporter_{state_, results_, failedRuns_, space_, nullptr, &pairs_};

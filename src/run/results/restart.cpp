@@ -12,6 +12,8 @@
 #include "common/replaceable_files.h"
 #include "common/run_files.h"
 #include "run/results/restart_settings.h"
+#include "run/results/row_check.h"
+#include "run/results/row_checksums.h"
 
 namespace mirevo {
 namespace {
@@ -19,6 +21,7 @@ namespace {
 constexpr std::string_view kRefusal = "Error: Unable to continue the earlier run";
 constexpr std::string_view kRemedy = "Restart = 0 starts afresh and keeps the earlier results under a numbered name.";
 constexpr std::size_t kMostChangesShown = 20;
+constexpr std::size_t kMostRowsShown = 20;
 
 [[noreturn]] void refuse(std::string_view detail) {
   fatalError(kRefusal, fmt::format("{}\n{}", detail, kRemedy));
@@ -54,6 +57,27 @@ void requireSameSettings(const RestartSettings& then, const RestartSettings& now
   refuse(detail);
 }
 
+/// Rows that cannot be read are made again; one that can be read and does not hold would have been believed, and only
+/// the user can tell what it was. Returns how many rows have no checksum.
+std::size_t requireRowsThatHold(const std::vector<ResultRow>& rows, const RestartFiles& files,
+                                const RunConfig& config) {
+  const RowChecksums checksums = readRowChecksums(readFileIfThere(files.checksums).value_or(""));
+  const CheckedRows checked = checkRows(rows, checksums, config, RowOrigin::thisSetup);
+  if (checked.faults.empty()) return checked.withoutChecksum;
+  std::string detail = fmt::format("{} has rows that do not hold:", files.results);
+  for (std::size_t i = 0; i < std::min(checked.faults.size(), kMostRowsShown); ++i) {
+    detail += "\n   " + rowFaultText(checked.faults[i]);
+  }
+  if (checked.faults.size() > kMostRowsShown) {
+    detail += fmt::format("\n   and {} more", checked.faults.size() - kMostRowsShown);
+  }
+  detail += "\nRestore these lines from a copy, or delete them: their evaluations are then made again.";
+  if (!checksums.empty()) {
+    detail += fmt::format("\nIf the rows are right and {} is not, remove that file.", files.checksums);
+  }
+  refuse(detail);
+}
+
 /// The number of the last evaluation before which none is missing.
 int lastWithoutGap(std::span<const ResultRow> rows) {
   int last = 0;
@@ -86,7 +110,8 @@ void dropFailuresAtEnd(EarlierRun& run) {
 RestartFiles restartFiles(const std::string& filePrefix, const ResultFileNames& names) {
   return {runFilePath(filePrefix, names.results),         runFilePath(filePrefix, names.restart),
           runFilePath(filePrefix, names.simulatedValues), runFilePath(filePrefix, names.record),
-          runFilePath(filePrefix, names.failures),        runFilePath(filePrefix, names.pairs)};
+          runFilePath(filePrefix, names.failures),        runFilePath(filePrefix, names.pairs),
+          runFilePath(filePrefix, names.checksums)};
 }
 
 std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunConfig& config,
@@ -105,12 +130,18 @@ std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunCon
     refuse(files.results + " has other columns than the setup asks for", files.results, run_files::kPlain.results);
   }
 
+  const std::size_t withoutChecksum = requireRowsThatHold(table.rows, files, config);
   if (!record) record = recordOfEarlierVersion(table);
   EarlierRun run{std::move(table.rows), std::move(record->started), std::move(record->restarted), then.searches, {}};
   putInOrder(run.rows);
   if (table.unusableLines > 0) {
     run.notes.push_back(
         fmt::format("Rows of {} that were cut off or damaged are made again: {}", files.results, table.unusableLines));
+  }
+  if (withoutChecksum > 0) {
+    run.notes.push_back(
+        fmt::format("Rows of {} that are checked by their own values alone, as {} has no checksum of them: {}",
+                    files.results, fileNameOf(files.checksums), withoutChecksum));
   }
   if (config.restart == RestartMode::goOnAndRepeatFailed) dropFailuresAtEnd(run);
   const auto earlierBudget = searchBudget(then);

@@ -22,6 +22,7 @@ struct RestartFiles {
   std::string record;
   std::string failures;
   std::string pairs;
+  std::string checksums;  ///< of the rows of the results
 };
 
 /// The paths of these files; `filePrefix` is folder and name of the setup.
@@ -39,7 +40,8 @@ struct EarlierRun {
 
 /// The earlier run whose results are on disk, to be continued as the setup asks; empty if there is none. Rows that are
 /// cut off, or that a raised budget makes obsolete, are left out. Throws FatalError, naming what has changed, if the
-/// setup is not that of the earlier run. `record` is that of the earlier run; early versions of the program wrote none.
+/// setup is not that of the earlier run, and, naming the lines, if rows were changed or do not hold. `record` is that
+/// of the earlier run; early versions of the program wrote none.
 std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunConfig& config,
                                          const ResultColumns& columns, std::optional<RunRecord> record);
 

@@ -7,6 +7,7 @@
 
 #include <fmt/core.h>
 
+#include "common/checksum.h"
 #include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/text.h"
@@ -33,30 +34,48 @@ std::string commentLines(std::span<const std::string> texts) {
 void ResultFile::open(const std::string& path, std::span<const std::string> headLines, const ResultColumns& columns,
                       std::span<const ResultRow> earlierRows) {
   rows_.clear();
+  earlierAggregates_.clear();
   aggregates_.clear();
   columns_ = columns;
   std::string content = commentLines(headLines) + resultHeader(columns) + '\n';
   headLength_ = std::ssize(content);
   if (earlierRows.empty()) {
     file_.open(path);
+    checksums_.open({});
     file_.append(content);
     return;
   }
+  std::vector<RowChecksum> checksums;
   for (const ResultRow& row : earlierRows) {
-    const std::string line = resultRowText(row) + '\n';
-    rows_.push_back({row.number, std::ssize(content), std::ssize(line)});
-    content += line;
+    const std::string line = resultRowText(row);
+    rows_.push_back({row.number, std::ssize(content), std::ssize(line) + 1, checksumOf(line)});
+    checksums.push_back({row.number, rows_.back().checksum});
+    earlierAggregates_[row.number] = row.aggregate;
+    content += line + '\n';
   }
+  checksums_.complete(checksums);
   std::string reason;
   if (!replaceFile(path, content, reason)) fatalError("Error: Unable to write to " + path, reason);
+  checksums_.open(checksums);  // only now those of rows that are not taken up are superfluous
   file_.openToContinue(path);
 }
 
 void ResultFile::addRow(const ResultRow& row) {
-  const std::string line = resultRowText(row) + '\n';
+  const std::string line = resultRowText(row);
+  const std::uint64_t checksum = checksumOf(line);
+  checksums_.add({row.number, checksum});  // before the row, which would be taken for damaged without it
   const std::int64_t offset = file_.size();
-  file_.append(line);
-  rows_.push_back({row.number, offset, std::ssize(line)});
+  file_.append(line + '\n');
+  rows_.push_back({row.number, offset, std::ssize(line) + 1, checksum});
+}
+
+void ResultFile::replaceAggregate(int number, double aggregate) {
+  const auto earlier = earlierAggregates_.find(number);
+  if (earlier != earlierAggregates_.end() && earlier->second == aggregate) {
+    aggregates_.erase(number);
+  } else {
+    aggregates_[number] = aggregate;
+  }
 }
 
 bool ResultFile::isInOrder() const {
@@ -66,43 +85,60 @@ bool ResultFile::isInOrder() const {
 bool ResultFile::finish(std::span<const std::string> closingLines, std::string& reason) {
   if (!file_.isOpen()) return true;
   const std::string closing = commentLines(closingLines);
-  const bool isComplete = isInOrder() && aggregates_.empty();
-  bool finished = isComplete ? file_.tryAppend(closing, reason) : rewriteInOrder(closing, reason);
   std::string again;
-  if (!finished && !isComplete) file_.tryAppend(closing, again);  // better out of order than without an end
-  // A file that was put in order has been replaced, so errors of the old descriptor do not matter.
-  if (!file_.tryClose(again) && finished && isComplete) {
-    reason = again;
-    finished = false;
+  if (isInOrder() && aggregates_.empty()) {
+    const bool isAppended = file_.tryAppend(closing, reason);
+    const bool isClosed = file_.tryClose(isAppended ? reason : again);
+    const bool areChecksumsClosed = checksums_.tryClose(isAppended && isClosed ? reason : again);
+    return isAppended && isClosed && areChecksumsClosed;
   }
-  return finished;
+  const bool isRewritten = rewriteInOrder(closing, reason);
+  if (!isRewritten) file_.tryAppend(closing, again);  // better out of order than without an end
+  // Both files have been replaced, so that errors of the old descriptors do not matter.
+  file_.tryClose(again);
+  checksums_.tryClose(again);
+  return isRewritten && (aggregates_.empty() || checksums_.replace(checksumsOfRows(), reason));
 }
 
-void ResultFile::appendRow(std::string& text, std::string_view content, const Place& place) const {
-  const auto length = static_cast<std::size_t>(place.length) - 1;  // without the line end
-  const std::string_view line = content.substr(static_cast<std::size_t>(place.offset), length);
+/// Gives a row its final aggregate; returns its line without the end.
+std::string ResultFile::settleLine(std::string_view content, Place& place) const {
+  const auto length = static_cast<std::size_t>(place.length) - 1;
+  std::string line(content.substr(static_cast<std::size_t>(place.offset), length));
   const auto aggregate = aggregates_.find(place.number);
   auto row = aggregate == aggregates_.end() ? std::nullopt : readResultRow(line, columns_);
-  if (row) row->aggregate = aggregate->second;
-  text += row ? resultRowText(*row) : line;
-  text += '\n';
+  if (!row) return line;
+  row->aggregate = aggregate->second;
+  line = resultRowText(*row);
+  place.checksum = checksumOf(line);
+  return line;
 }
 
-bool ResultFile::rewriteInOrder(std::string_view closing, std::string& reason) const {
+std::vector<RowChecksum> ResultFile::checksumsOfRows() const {
+  std::vector<RowChecksum> checksums;
+  for (const Place& place : rows_) checksums.push_back({place.number, place.checksum});
+  return checksums;
+}
+
+bool ResultFile::rewriteInOrder(std::string_view closing, std::string& reason) {
   const auto content = readTextFile(path(), reason);
   if (!content) return false;
   if (std::ssize(*content) < file_.size()) {
     reason = "it was shortened by another program";
     return false;
   }
-  std::vector<Place> ordered = rows_;
-  std::stable_sort(ordered.begin(), ordered.end(), [](const Place& a, const Place& b) { return a.number < b.number; });
+  std::stable_sort(rows_.begin(), rows_.end(), [](const Place& a, const Place& b) { return a.number < b.number; });
+  std::vector<RowChecksum> checksums = checksumsOfRows();
   std::string sorted;
   sorted.reserve(content->size() + closing.size());
   sorted.append(*content, 0, static_cast<std::size_t>(headLength_));
-  for (const Place& place : ordered) appendRow(sorted, *content, place);
+  for (Place& place : rows_) {
+    const std::uint64_t before = place.checksum;
+    sorted += settleLine(*content, place) + '\n';
+    // Until the rows are replaced those of before are there.
+    if (place.checksum != before) checksums.push_back({place.number, place.checksum});
+  }
   sorted += closing;
-  return replaceFile(path(), sorted, reason);
+  return checksums_.replace(checksums, reason) && replaceFile(path(), sorted, reason);
 }
 
 }  // namespace mirevo

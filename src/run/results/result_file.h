@@ -5,18 +5,24 @@
 #include <span>
 #include <string>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 #include "run/results/record_file.h"
 #include "run/results/result_row.h"
+#include "run/results/row_checksums.h"
 
 namespace mirevo {
 
 /// The table of a run's evaluations: `#` head lines, a header row, one row per evaluation, `#` closing lines. Rows are
 /// written as evaluations finish, so that a killed run leaves every finished one on disk; finish() puts them in the
-/// order of their numbers.
+/// order of their numbers. Beside it the checksums of the rows are kept, with which a restart checks them.
 class ResultFile final {
  public:
+  /// `checksums`: the path of their file; `tableHead` is over it, for people.
+  ResultFile(std::string checksums, std::vector<std::string> tableHead)
+      : checksums_(std::move(checksums), std::move(tableHead)) {}
+
   /// Creates the file with its head lines (without "# "), its header row and the rows of an earlier run, and replaces
   /// the earlier file with it, so that no row is ever missing from disk. Throws FatalError.
   void open(const std::string& path, std::span<const std::string> headLines, const ResultColumns& columns,
@@ -25,11 +31,12 @@ class ResultFile final {
   /// Writes one evaluation. Throws FatalError when that fails.
   void addRow(const ResultRow& row);
 
-  /// Changes the aggregate of a row that is written already; takes effect on disk with finish().
-  void replaceAggregate(int number, double aggregate) { aggregates_[number] = aggregate; }
+  /// Changes the aggregate of a row that is written already, if it is another; takes effect on disk with finish().
+  void replaceAggregate(int number, double aggregate);
 
-  /// Puts the rows in the order of their numbers and writes the closing lines (without "# "). False, with the system's
-  /// reason, when that fails; what was written before is then still there. Does nothing if the file is not open.
+  /// Puts the rows and their checksums in the order of their numbers and writes the closing lines (without "# ").
+  /// False, with the system's reason, when that fails; what was written before is then still there. Does nothing if the
+  /// file is not open.
   bool finish(std::span<const std::string> closingLines, std::string& reason);
 
   bool isOpen() const { return file_.isOpen(); }
@@ -43,16 +50,20 @@ class ResultFile final {
     int number;
     std::int64_t offset;
     std::int64_t length;
+    std::uint64_t checksum;
   };
   bool isInOrder() const;
-  void appendRow(std::string& text, std::string_view content, const Place& place) const;
-  bool rewriteInOrder(std::string_view closing, std::string& reason) const;
+  std::string settleLine(std::string_view content, Place& place) const;
+  std::vector<RowChecksum> checksumsOfRows() const;
+  bool rewriteInOrder(std::string_view closing, std::string& reason);
 
   RecordFile file_;
+  RowChecksumFile checksums_;
   ResultColumns columns_;
   std::int64_t headLength_ = 0;
   std::vector<Place> rows_;
-  std::map<int, double> aggregates_;  ///< by row number
+  std::map<int, double> earlierAggregates_;  ///< of the rows of an earlier run, by number
+  std::map<int, double> aggregates_;         ///< those that are to be changed, by number
 };
 
 }  // namespace mirevo

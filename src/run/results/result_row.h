@@ -28,6 +28,7 @@ struct ResultRow {
   std::vector<double> measures;
   std::vector<double> objectives;
   double aggregate = kFailedRunValue;
+  std::size_t line = 0;  ///< of a row that was read: the line of its file, from 1
 };
 
 /// The columns for a setup.

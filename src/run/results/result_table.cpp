@@ -10,7 +10,8 @@ namespace mirevo {
 namespace {
 
 /// Reads the line of a row; false if it is damaged.
-bool takeRow(std::string_view line, std::size_t columnCount, const ResultColumns& columns, ResultTable& table) {
+bool takeRow(std::string_view line, std::size_t lineNumber, std::size_t columnCount, const ResultColumns& columns,
+             ResultTable& table) {
   if (!table.hasExpectedCount) {
     const bool isWhole = cellCount(line) == columnCount;
     if (isWhole) ++table.rowsOfOtherColumns;
@@ -18,6 +19,7 @@ bool takeRow(std::string_view line, std::size_t columnCount, const ResultColumns
   }
   auto row = readResultRow(line, columns);
   if (!row) return false;
+  row->line = lineNumber;
   table.rows.push_back(std::move(*row));
   return true;
 }
@@ -27,7 +29,7 @@ bool takeRow(std::string_view line, std::size_t columnCount, const ResultColumns
 ResultTable readResultTable(std::string_view text, const ResultColumns& columns) {
   ResultTable table;
   std::size_t columnCount = 0;
-  while (!text.empty()) {
+  for (std::size_t lineNumber = 1; !text.empty(); ++lineNumber) {
     const std::size_t end = text.find('\n');
     const std::string_view line = trimTrailing(text.substr(0, end));
     if (end == std::string_view::npos) {
@@ -39,7 +41,7 @@ ResultTable readResultTable(std::string_view text, const ResultColumns& columns)
     if (line.front() == '#') {
       (table.hasHeader ? table.closingLines : table.headLines).emplace_back(trim(line.substr(1)));
     } else if (table.hasHeader) {
-      if (!takeRow(line, columnCount, columns, table)) ++table.unusableLines;
+      if (!takeRow(line, lineNumber, columnCount, columns, table)) ++table.unusableLines;
     } else if (isResultHeader(line)) {
       table.hasHeader = true;
       columnCount = cellCount(line);

@@ -63,6 +63,7 @@ RunResults::RunResults(const RunConfig& config, const SearchSpace& space, const 
       columns_(resultColumns(config, space)),
       names_(namesOf(config)),
       files_(restartFiles(filePrefix, names_)),
+      table_(files_.checksums, tableHead_),
       failedRuns_({pathBeside(filePrefix, run_files::kFailedRuns), files_.failures}, config.setupName, space.names,
                   tableHead_),
       pairs_(files_.pairs, tableHead_),
@@ -108,16 +109,17 @@ std::vector<std::string> RunResults::bandPaths(const RunConfig& config) const {
 }
 
 std::vector<std::string> RunResults::pathsBesideResults() const {
-  std::vector<std::string> paths{files_.record, files_.failures, files_.pairs};
+  std::vector<std::string> paths{files_.record, files_.failures, files_.pairs, files_.checksums};
   for (const RunFile& table : names_.tables) paths.push_back(runFilePath(filePrefix_, table));
   return paths;
 }
 
 void RunResults::requireReplaceableFiles(const RunConfig& config) const {
   if (!config.task) return;
-  std::vector<RunFile> files{
-      names_.results, names_.restart,     names_.simulatedValues, names_.record,           names_.failures,
-      names_.pairs,   run_files::kSeries, run_files::kReport,     run_files::kSavedFolder, run_files::kOwnFailedRuns};
+  std::vector<RunFile> files{names_.results,          names_.restart,           names_.simulatedValues,
+                             names_.record,           names_.failures,          names_.pairs,
+                             names_.checksums,        run_files::kSeries,       run_files::kReport,
+                             run_files::kSavedFolder, run_files::kOwnFailedRuns};
   files.insert(files.end(), names_.tables.begin(), names_.tables.end());
   for (const RunFile& file : files) requireReplaceable(runFilePath(filePrefix_, file), file);
   requireReplaceable(pathBeside(filePrefix_, run_files::kFailedRuns), run_files::kFailedRuns);

@@ -94,7 +94,8 @@ class EarlierRunTest : public SetupFixture {
   static constexpr const char* kHeader = "Evaluation\tStatus\tDepth\tRate\tFlow error\tWritten\tFlow\tAggregate\n";
 
   std::string row(int number, const char* status = "OK") const {
-    return std::to_string(number) + "\t" + status + "\t400\t0.5\t1\t2\t3\t4\n";
+    const bool isOk = std::string_view(status) == "OK";
+    return fmt::format("{}\t{}\t400\t0.5\t{}\n", number, status, isOk ? "2\t7\t4\t3" : "1e30\t1e30\t1e30\t1e30");
   }
   /// The numbers of the rows that a run with `now` goes on from; or the refusal.
   std::string taken(const RunConfig& then, const RunConfig& now, const std::string& rows) {
@@ -127,7 +128,6 @@ TEST_F(EarlierRunTest, RowsThatTheRunGoesOnFrom) {
   EXPECT_EQ(taken(config, config, rows), "1 2 3 4 5 ");
   record_.emplace().started = "the day before";
   record_->restarted = {"later"};
-  EXPECT_EQ(taken(config, config, rows + row(5)), "1 2 3 4 5 ");
   EXPECT_EQ(taken(config, config, rows + "6\tOK\t400\t0"), "1 2 3 4 5 ");
   EXPECT_EQ(taken(config, config, rows + row(30) + row(31)), "1 2 3 4 5 30 31 ");
   config.restart = RestartMode::goOnAndRepeatFailed;
@@ -138,6 +138,24 @@ TEST_F(EarlierRunTest, RowsThatTheRunGoesOnFrom) {
   EXPECT_EQ(taken(config, raised, rows + row(30) + row(31)), "1 2 3 4 5 30 ");
   const RunConfig tooSmall = read("Max_No_Evaluations = 500 => 19");
   EXPECT_THAT(taken(tooSmall, raised, rows), HasSubstr("only a search whose budget held its initial sample of 20"));
+}
+
+TEST_F(EarlierRunTest, RowsThatDoNotHoldEndTheRestart) {
+  RunConfig config = read();
+  config.restart = RestartMode::goOn;
+  folder_.write("setup_Optimisation_Checksums.dat", "Evaluation\tChecksum\n2\t0123456789abcdef\n");
+  std::string rows = row(2);
+  for (int i = 0; i < 21; ++i) rows += row(1);
+  const std::string told = withoutFolder(taken(config, config, rows));
+  EXPECT_THAT(told,
+              testing::StartsWith("setup_Optimisation.dat has rows that do not hold:\n"
+                                  "   line 4 (evaluation No. 2): it is not as it was written: it has another checksum\n"
+                                  "   line 6 (evaluation No. 1): the evaluation is in line 5, too\n"));
+  EXPECT_THAT(told, testing::EndsWith(
+                        "\n   and 1 more\n"
+                        "Restore these lines from a copy, or delete them: their evaluations are then made again.\n"
+                        "If the rows are right and setup_Optimisation_Checksums.dat is not, remove that file.\n"
+                        "Restart = 0 starts afresh and keeps the earlier results under a numbered name."));
 }
 
 TEST_F(EarlierRunTest, ARaisedBudgetOfDdsIsAnotherSearch) {

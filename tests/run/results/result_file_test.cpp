@@ -1,5 +1,7 @@
 #include "run/results/result_file.h"
 
+#include <algorithm>
+#include <cmath>
 #include <csignal>
 #include <sys/resource.h>
 #include <tuple>
@@ -7,6 +9,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "common/checksum.h"
 #include "common/text.h"
 #include "refusal.h"
 #include "run/results/failed_run_file.h"
@@ -42,9 +45,22 @@ class ResultFileTest : public ::testing::Test {
     results_.addRow(resultRow(std::span(&parameter, 1), result));
   }
 
+  /// Whether each row on disk is as one of its checksums says; how many checksums there are.
+  std::size_t checksums() const {
+    const RowChecksums checksums = readRowChecksums(folder_.read("r_Checksums.dat"));
+    const std::string text = folder_.read("r.dat");
+    for (const std::string_view line : splitLines(text)) {
+      const auto [begin, end] = checksums.equal_range(parseInteger(line.substr(0, line.find('\t'))).value_or(0));
+      const bool isRow = !line.empty() && line.front() >= '0' && line.front() <= '9';
+      const auto isRight = [line](const auto& entry) { return entry.second == checksumOf(line); };
+      EXPECT_TRUE(!isRow || std::any_of(begin, end, isRight)) << line;
+    }
+    return checksums.size();
+  }
+
   TemporaryFolder folder_;
   std::string path_ = (folder_ / "r.dat");
-  ResultFile results_;
+  ResultFile results_{folder_ / "r_Checksums.dat", {"Mirevo 1"}};
   std::string reason_;
 };
 
@@ -56,6 +72,7 @@ TEST_F(ResultFileTest, EveryRowIsOnDiskAtOnceAndReadsBackExactly) {
   EXPECT_EQ(folder_.read("r.dat"), std::string(kHeadText) +
                                        "1\tOK\t0.3333333333333333\t0.30000000000000004\t5e-324\t5e-324\n"
                                        "2\tFAILED\t-0\t1e+30\t1e+30\t1e+30\n");
+  EXPECT_EQ(checksums(), 2U);
 }
 
 TEST_F(ResultFileTest, RowsEndUpInTheOrderOfTheirNumbers) {
@@ -68,6 +85,38 @@ TEST_F(ResultFileTest, RowsEndUpInTheOrderOfTheirNumbers) {
     if (!arrival.empty()) expected += "1\tOK\t1\t1\t1\t1\n2\tOK\t2\t2\t2\t2\n3\tOK\t3\t3\t3\t3\n";
     EXPECT_EQ(folder_.read("r.dat"), expected + "# done\n# Best evaluation: 1\n");
     EXPECT_FALSE(folder_.exists("r.dat.tmp"));
+    EXPECT_EQ(checksums(), arrival.size());
+  }
+}
+
+TEST_F(ResultFileTest, ChecksumsFollowTheAggregatesThatAreSettledAtTheEnd) {
+  std::filesystem::create_directories((folder_ / "r.dat.tmp"));
+  for (const bool succeeds : {false, true}) {
+    open();
+    for (const int number : {2, 1}) add(success(number, 1, std::nan("")), number);
+    results_.replaceAggregate(1, 5.0);
+    EXPECT_EQ(results_.finish({}, reason_), succeeds);
+    EXPECT_EQ(checksums(), succeeds ? 2U : 3U);  // before the rows are replaced those of both are there
+    std::filesystem::remove(folder_ / "r.dat.tmp");
+  }
+  EXPECT_TRUE(folder_.read("r.dat").ends_with("1\tOK\t1\t1\tNaN\t5\n2\tOK\t2\t1\tNaN\tNaN\n"));
+}
+
+TEST_F(ResultFileTest, RowsThatAreTakenUpHaveTheirChecksumsWhateverTheFileHeld) {
+  const double parameter = 1.0;
+  const std::vector<ResultRow> rows{resultRow(std::span(&parameter, 1), success(7, 1, 2)),
+                                    resultRow(std::span(&parameter, 1), success(8, 1, 2))};
+  for (const char* before : {"", "Evaluation\tChecksum\n7\t00000000000000ff\n9\t00000000000000ff\n8\t0000"}) {
+    folder_.write("r_Checksums.dat", before);
+    results_.open(path_, kHead, kColumns, rows);
+    EXPECT_EQ(checksums(), 2U);
+    add(success(9, 1, 2), 1);
+    EXPECT_EQ(checksums(), 3U);
+    results_.replaceAggregate(7, 2.0);  // as it is
+    results_.replaceAggregate(8, 3.0);
+    ASSERT_TRUE(results_.finish({}, reason_)) << reason_;
+    EXPECT_EQ(checksums(), 3U);
+    EXPECT_THAT(folder_.read("r.dat"), testing::HasSubstr("\n7\tOK\t1\t1\t2\t2\n8\tOK\t1\t1\t2\t3\n9\t"));
   }
 }
 
