@@ -254,7 +254,7 @@ void RunDriver::putEarlierReportAside() {
   if (results_->earlierEvaluations() != nullptr && isReportOf(path, config_.task->facts().name.name, reason)) {
     std::filesystem::remove(path, ignored);
   } else {
-    if (!reason.empty() && std::filesystem::exists(path, ignored)) {
+    if (!reason.empty() && reason != std::strerror(ENOENT)) {
       state_.log.warning(fmt::format("{}: {}. Of which task it is is not known", path, reason));
     }
     keepEarlierFile(path, state_.log);
