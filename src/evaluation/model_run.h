@@ -88,6 +88,7 @@ class ModelRunner final {
   InitialPairs initialPairs() const;
   /// templateDoubts() of all templates.
   const std::vector<std::string>& templateWarnings() const { return templateWarnings_; }
+  const std::vector<std::string>& seriesWarnings() const { return series_.warnings(); }
 
  private:
   /// Paths of one slot's copies of the model's files.

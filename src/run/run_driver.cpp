@@ -207,6 +207,7 @@ void RunDriver::logSetup() {
     for (const std::string& text : config_.task->warnings(parameters_->searchSpace())) state_.log.warning(text);
   }
   for (const std::string& text : runner_->templateWarnings()) state_.log.warning(text);
+  for (const std::string& text : runner_->seriesWarnings()) state_.log.warning(text);
   for (const std::string& text :
        unusedParameterWarnings(config_.parameters, config_.constraints, runner_->templates())) {
     state_.log.warning(text);
