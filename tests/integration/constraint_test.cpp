@@ -70,6 +70,22 @@ TEST(Constraints, AreTestedBeforeTheFirstRunOfASensitivityAnalysisAndOfScenarios
   }
 }
 
+TEST(Constraints, ThatNoSetSatisfiesAreToldBeforeAnyFileIsTouched) {
+  for (const auto& [option, results] : {std::pair{2, "basin_Optimisation.dat"}, {3, "basin.dat"}}) {
+    const ModelFolder folder;
+    runConstrained(folder, {.option = option, .maxEvaluations = 12}, option == 3);
+    const std::string expected = folder.read(results);
+    folder.editSetup("'6.9'", "'-1'");
+    for (int start = 1; start <= 2; ++start) {
+      const ProgramResult run = runProgram({folder / "basin.kdx"});
+      EXPECT_THAT(run.error, HasSubstr("Error: No parameter set found that satisfies the constraints\n"));
+      EXPECT_THAT(folder.read("basin.log"), HasSubstr("\nThe run did not begin: no model was run"));
+      EXPECT_EQ(folder.read(results), expected);
+      EXPECT_FALSE(folder.exists("basin.2.log")) << "that of the first refusal";
+    }
+  }
+}
+
 TEST(Constraints, TellOfASampleOfWhichTooManySetsViolateThemBeforeTheFirstRunAndAreMetByOneDrawnAgain) {
   const ModelFolder folder;
   const RunSettings settings{.option = 3, .maxEvaluations = 60};  // of a + b about 7
