@@ -178,7 +178,7 @@ std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, 
 
 std::string takeSensitivities(const std::string& filePrefix, ReportedSensitivity& sensitivity) {
   const std::string path = runFilePath(filePrefix, run_files::kSensitivities);
-  const std::string damaged = fileNameOf(path) + " is cut off or damaged";
+  std::string damaged = fileNameOf(path) + " is cut off or damaged";
   std::string fault;
   const ReadTable table = readTable(path, fault);
   if (!fault.empty()) return fault;

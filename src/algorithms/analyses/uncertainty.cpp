@@ -192,8 +192,8 @@ UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome, const
       modelValues.size(), [&](std::size_t i) -> auto& { return modelValues[i]; });
   for (std::size_t j = 0; j < summary.parameters.size(); ++j) {
     if (space.transformation[j] != TransformationType::integer) continue;
-    std::vector<double> steps;
-    for (const std::vector<double>& values : modelValues) steps.push_back(values[j]);
+    std::vector<double> steps(modelValues.size());
+    for (std::size_t i = 0; i < steps.size(); ++i) steps[i] = modelValues[i][j];
     summary.parameters[j] = summariseSample(steps, QuantileKind::ofValues);
   }
   summary.correlations = correlationMatrix(modelValues);

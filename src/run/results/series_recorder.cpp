@@ -43,7 +43,8 @@ void SeriesRecorder::resume(const SeriesTable& table) {
   const auto takeOver = [&](const std::optional<ShownEvaluation>& evaluation, std::vector<float> ShownSeries::*column) {
     std::optional<Held> held;
     if (!evaluation) return held;
-    held.emplace().evaluation = *evaluation;
+    held = Held{};
+    held->evaluation = *evaluation;
     bool isThere = false;
     for (const std::string& measure : run_.measures) {
       PeriodSeries& series = held->series.emplace_back();
