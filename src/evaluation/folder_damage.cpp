@@ -32,9 +32,9 @@ std::string faultOfParameterFile(const std::string& path) {
   return fault.empty() ? faultOfAccess(folderOf(path), W_OK | X_OK) : fault;
 }
 
-/// `original`: the same file in the base folder. A folder that is not there either, the model makes in each run.
-std::string faultOfOutput(const std::string& path, const std::string& original) {
-  if (typeOf(folderOf(path)) == 0 && typeOf(folderOf(original)) == 0) return {};
+/// A folder that is not there, the model may make in each run.
+std::string faultOfOutput(const std::string& path) {
+  if (typeOf(folderOf(path)) == 0) return {};
   std::string fault = faultOfAccess(folderOf(path), W_OK | X_OK);
   return fault.empty() && typeOf(path) == S_IFDIR ? std::strerror(EISDIR) : fault;
 }
@@ -66,7 +66,7 @@ std::optional<FolderDamage> findDamage(const std::string& folder, const FolderNe
     if (!why.empty()) return damageOf("Unable to open", file, std::move(why));
   }
   for (const std::string& file : needs.outputs) {
-    std::string why = faultOfOutput(folder + file, needs.baseFolder + file);
+    std::string why = faultOfOutput(folder + file);
     if (!why.empty()) return damageOf("Unable to remove", file, std::move(why));
   }
   for (const std::string& file : needs.batchFiles) {

@@ -10,7 +10,6 @@ namespace mirevo {
 /// What a model run needs in its process folder, a copy of the base folder; the files are paths below these with their
 /// leading "/".
 struct FolderNeeds {
-  std::string baseFolder;
   std::vector<std::string> parameterFiles;
   std::vector<std::string> outputs;  ///< the simulated files and the output-measure file
   std::vector<std::string> savedFiles;

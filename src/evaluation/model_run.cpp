@@ -163,7 +163,6 @@ void ModelRunner::writeConvertedTemplates(int slot) const {
 
 FolderNeeds ModelRunner::folderNeeds(const LauncherSettings& settings) const {
   FolderNeeds needs;
-  needs.baseFolder = description_.baseFolder;
   for (const ParameterFileItem& item : description_.parameterFiles) {
     needs.parameterFiles.push_back(belowBase(item.paramFileName));
   }

@@ -118,7 +118,7 @@ TEST(Results, WhatIsNotOfARunIsNeitherRenamedNorRemoved) {
       EXPECT_EQ(run.exitCode, 1) << name;
       EXPECT_THAT(run.error, AllOf(HasSubstr(path), HasSubstr(text)));
       EXPECT_FALSE(folder.exists("another.dat"));
-      std::filesystem::remove(path);
+      EXPECT_TRUE(std::filesystem::remove(path)) << name;
     }
   }
   folder.write("basin_Failed7/notes.txt", "the user's");

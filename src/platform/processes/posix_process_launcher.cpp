@@ -131,7 +131,7 @@ PosixProcessLauncher::~PosixProcessLauncher() {
   for (const Slot& slot : slots_) {
     // A model has put it in the place of its folder; the next run would refuse it as the user's.
     std::error_code ignored;
-    if (std::filesystem::is_symlink(slot.folder, ignored)) std::filesystem::remove(slot.folder, ignored);
+    if (slot.isMade && std::filesystem::is_symlink(slot.folder, ignored)) std::filesystem::remove(slot.folder, ignored);
   }
 }
 
@@ -224,6 +224,7 @@ void PosixProcessLauncher::prepareSlot(const LauncherSettings& settings, int num
                            settings.baseFolder, slot.folder));
   }
   makeProcessFolder(baseFolder_, slot.folder, processFolderPrefix_);
+  slot.isMade = true;
   makeFilesOwn(slot.folder, baseFolder_, ownFiles_, processFolderPrefix_);
   if (!renewLog(slot)) {
     fatalError(fmt::format("Unable to create {}/{}: {}", slot.folder, run_files::kBatchLog, std::strerror(errno)));

@@ -47,6 +47,7 @@ class PosixProcessLauncher final : public ProcessLauncher {
  private:
   struct Slot {
     std::string folder;
+    bool isMade = false;                 ///< the folder, by this run
     std::vector<SpawnCommand> commands;  ///< one per batch item
     std::size_t item = 0;                ///< the item that runs, or ran last
     int pidfd = -1;                      ///< -1 while nothing runs

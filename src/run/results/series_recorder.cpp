@@ -60,6 +60,7 @@ void SeriesRecorder::resume(const SeriesTable& table) {
   initial_ = takeOver(table.initial, &ShownSeries::initial);
   if (initial_) initialChoice_.resume(initial_->evaluation.number, table.isOfInitialParameters);
   best_ = takeOver(table.best, &ShownSeries::best);
+  earlierBest_ = best_;
   isChanged_ = initial_.has_value();
 }
 
@@ -94,7 +95,8 @@ void SeriesRecorder::evaluationPassed(const EvaluationResult& result, std::span<
   if (std::isnan(result.aggregate)) {
     if (auto held = heldOfKept(result, values)) holdUnsettled(*std::move(held));
   } else if (best && best->number == result.number && (!best_ || best_->evaluation.number != best->number)) {
-    if (const auto held = heldOfKept(result, values)) follow(best, &*held);
+    const bool isThere = earlierBest_ && earlierBest_->evaluation.number == result.number;
+    if (const auto held = isThere ? earlierBest_ : heldOfKept(result, values)) follow(best, &*held);
   }
 }
 

@@ -90,7 +90,8 @@ class SeriesRecorder final {
   std::optional<Held> initial_;
   InitialChoice initialChoice_;  ///< among the evaluations that have series
   std::optional<Held> best_;
-  std::map<int, Held> unsettled_;  ///< evaluations whose aggregate comes later, by number
+  std::optional<Held> earlierBest_;  ///< of the run that goes on, while earlier evaluations pass
+  std::map<int, Held> unsettled_;    ///< evaluations whose aggregate comes later, by number
   std::size_t unsettledSteps_ = 0;
   bool isChanged_ = false;
   double nextWrite_ = 0.0;  ///< not before this time

@@ -190,6 +190,19 @@ TEST_F(SeriesRecorderTest, OfAnEarlierRunShowsTheTrueBestFromWhatWasKeptOrSaysTh
     std::filesystem::remove(folder_ / "s_Series.dat");
     best_.reset();
   }
+
+  {
+    SeriesRecorder killed = recorder();
+    evaluate(killed, 2, 5.0);
+  }
+  SeriesRecorder run = recorder(true);  // the best of the earlier run stays the best, at all its times
+  run.resume(table());
+  for (const BestEvaluation& best : {BestEvaluation{1, 6.0, {1.0}}, {2, 5.0, {2.0}}}) {
+    run.evaluationPassed({.number = best.number, .aggregate = best.aggregate, .simulatedValues = {-1, 1.5, 1.5}},
+                         best.parameterValues, best);
+  }
+  run.finish(BestEvaluation{2, 5.0, {2.0}});
+  EXPECT_THAT(table().series.at(0).best, ElementsAre(2.0F, 2.0F, 2.0F));
 }
 
 }  // namespace
