@@ -44,13 +44,14 @@ struct ChangingField {
   }
 
   std::string text() const {
-    const auto writtenText = [&](Side side) { return trim(FormatValueForPlaceholder(modelValues[side], width)); };
+    const auto writtenText = [&](Side side) {
+      return std::string(trim(FormatValueForPlaceholder(modelValues[side], width)));
+    };
     const std::string where =
         name.empty() ? fmt::format("its field of {} characters", width)
                      : fmt::format("the field of {} characters of the dependent parameter {}", width, name);
     return fmt::format("in {} {} is written as \"{}\" and {} as \"{}\"", where, formatReal(modelValues[below]),
-                       std::string(writtenText(below)), formatReal(modelValues[above]),
-                       std::string(writtenText(above)));
+                       writtenText(below), formatReal(modelValues[above]), writtenText(above));
   }
 };
 
