@@ -112,6 +112,10 @@ ModelRunner::ModelRunner(ModelDescription description, ParameterModel& parameter
   const std::vector<std::string> converted = readTemplates();
   series_ = SeriesTables::MirevoTSobjectInit(description_.measures, description_.period);
   shownMeasures_ = measuresOfDistinctPairs(description_.measures);
+  for (const OutputMeasure& measure : description_.measures) {
+    if (measure.interfaceType != InterfaceType::measureFile) continue;
+    numbersNeeded_ = std::max(numbersNeeded_, static_cast<std::size_t>(measure.measurementNo));
+  }
   savedFiles_ = SavedFiles(description_.savedFiles, description_.baseFolder, description_.savedFolder);
   for (std::size_t i = 0; i < description_.measures.size() && description_.keepSimulatedValues; ++i) {
     const OutputMeasure& measure = description_.measures[i];
@@ -355,7 +359,7 @@ std::optional<EvaluationFailure> ModelRunner::readMeasures(int slot, EvaluationR
   std::vector<double> written;
   if (!files.measureFile.empty()) {
     std::string reason;
-    auto numbers = readMeasureFile(files.measureFile, reason);
+    auto numbers = readMeasureFile(files.measureFile, numbersNeeded_, reason);
     if (!numbers) return makeFailure(Kind::resultsNotReadable, std::move(reason), slot);
     written = std::move(*numbers);
   }

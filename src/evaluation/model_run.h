@@ -122,6 +122,7 @@ class ModelRunner final {
   std::vector<ParameterTemplate> templates_;  ///< one per parameter file
   std::vector<std::string> templateWarnings_;
   SeriesTables series_;
+  std::size_t numbersNeeded_ = 0;  ///< in the output-measure file
   SavedFiles savedFiles_;
   std::vector<ObservedSeries> observedSeries_;
   std::vector<std::size_t> shownMeasures_;

@@ -83,6 +83,7 @@ TEST_F(ModelRunTest, MeasureFileValuesAreTakenByTheirNumber) {
   const std::pair<std::string, std::string> cases[] = {{"7 8.5 # rms and bias", ""},
                                                        {"7\n", file + ": expected at least 2 numbers, found 1"},
                                                        {"7\n8.x\n", file + ":2"},
+                                                       {"7 0,153", file + ":1:3: \"0,153\" may be"},
                                                        {"", file + ": expected at least 2 numbers, found 0"}};
   for (const auto& [content, reason] : cases) {
     writes("out/measures.txt", content);

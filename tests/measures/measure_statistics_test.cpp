@@ -174,14 +174,35 @@ TEST(MeasureStatistics, ATextColumnIsRefusedWithItsPlace) {
 
 TEST(MeasureFile, FreeFormat) {
   std::string reason;
-  const auto numbers = parseMeasureFile("m.txt", "# measures\r\n1.5, -2 ;\t3D2\r\n\n.25# the last\n,,7", reason);
+  const auto numbers = parseMeasureFile("m.txt", "# measures\r\n1.5, -2 ;\t3D2\r\n\n.25# the last\n,,7", 1, reason);
   ASSERT_TRUE(numbers.has_value()) << reason;
   EXPECT_THAT(*numbers, ElementsAre(1.5, -2.0, 300.0, 0.25, 7.0));
-  EXPECT_THAT(parseMeasureFile("m.txt", "", reason).value(), IsEmpty());
-  EXPECT_FALSE(parseMeasureFile("m.txt", "1 2\n3, NaN\n", reason).has_value());
+  EXPECT_THAT(parseMeasureFile("m.txt", "", 1, reason).value(), IsEmpty());
+  EXPECT_FALSE(parseMeasureFile("m.txt", "1 2\n3, NaN\n", 1, reason).has_value());
   EXPECT_EQ(reason, "m.txt:2:4: expected a number, found \"NaN\"");
-  EXPECT_FALSE(readMeasureFile("no_such_folder/m.txt", reason).has_value());
+  EXPECT_FALSE(readMeasureFile("no_such_folder/m.txt", 1, reason).has_value());
   EXPECT_EQ(reason, "no_such_folder/m.txt: No such file or directory");
+}
+
+TEST(MeasureFile, ACommaThatMayBeADecimalOneIsRefused) {
+  // content, numbers that are needed, numbers read; none: refused
+  const std::tuple<const char*, std::size_t, std::size_t> cases[] = {
+      {"0,153", 1, 0},  {"# a,b\n7;-0,2D1,\n", 2, 0},
+      {"0,153", 2, 2},  {"0, 153", 1, 2},
+      {"1,2,3", 1, 3},  {"0,5 1.5", 1, 3},
+      {"2,3\n4", 2, 0}, {"1,-2", 1, 2},
+      {"1,,2", 1, 2},
+  };
+  for (const auto& [content, needed, count] : cases) {
+    std::string reason;
+    const auto numbers = parseMeasureFile("m.txt", content, needed, reason);
+    EXPECT_EQ(numbers ? numbers->size() : 0, count) << content << reason;
+  }
+  std::string reason;
+  parseMeasureFile("m.txt", "7 8\n 0,153", 1, reason);
+  EXPECT_EQ(reason,
+            "m.txt:2:2: \"0,153\" may be one number with a decimal comma or two: a decimal point, or a blank behind a "
+            "comma that separates, tells");
 }
 
 }  // namespace
