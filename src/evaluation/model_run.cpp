@@ -385,7 +385,8 @@ std::optional<EvaluationFailure> ModelRunner::readMeasures(int slot, EvaluationR
   for (const ObservedSeries& observed : observedSeries_) {
     if (failure) break;
     appendSimulatedValues(observed, description_.measures[observed.measure], description_.keptPrecision,
-                          series_.simulation(observed.measure), result.simulatedValues);
+                          description_.period.largestGapDays(), series_.simulation(observed.measure),
+                          result.simulatedValues);
   }
   return failure;
 }

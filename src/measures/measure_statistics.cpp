@@ -86,7 +86,8 @@ void forEachObservation(const SeriesItem& simulation, const SeriesItem& observat
     if (time < days.start - kSameTimeDays) continue;
     if (time > days.end + kSameTimeDays) break;
     if (isMissing(observed[k], observation.deleteValue)) continue;
-    if (!use(time, observed[k], valueAt(simulation.series, simulation.item, time, hint))) break;
+    if (!use(time, observed[k], valueAt(simulation.series, simulation.item, time, hint, period.largestGapDays())))
+      break;
   }
 }
 

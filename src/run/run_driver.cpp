@@ -267,6 +267,7 @@ void RunDriver::openSeries() {
   run.observations = runner_->readShownObservations();
   run.periodFirst = secondNumber(config_.period.start);
   run.periodLast = secondNumber(config_.period.end);
+  run.largestGap = config_.period.largestGapDays();
   run.initialValues = ToModelScale(parameters_->searchSpace(), parameters_->searchSpace().initial);
   series_ = std::make_unique<SeriesRecorder>(path, std::move(run), runTimeClock,
                                              [this](std::string_view text) { state_.log.warning(text); });

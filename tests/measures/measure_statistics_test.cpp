@@ -11,6 +11,7 @@
 #include <gtest/gtest.h>
 
 #include "matchers.h"
+#include "measures/observed_series.h"
 #include "platform/series/csv_time_series.h"
 #include "platform/series/memory_time_series.h"
 #include "refusal.h"
@@ -78,6 +79,7 @@ TEST(MeasureStatistics, AreTheSameBitsAsEver) {
 
 TEST(MeasureStatistics, UsesTheObservationsThatCount) {
   const DateRecord first{2001, 1, 1};
+  const DateRecord noon{2000, 12, 31, 12};
   const EvaluationPeriod middle{{2001, 1, 2}, {2001, 1, 4}};
   const EvaluationPeriod firstDay{first, {2001, 1, 1, 24, 0}};
   using Values = std::vector<float>;
@@ -88,8 +90,16 @@ TEST(MeasureStatistics, UsesTheObservationsThatCount) {
       {"a period that ends at 24:00", {1, 2, 3}, first, {0, 0, 0}, firstDay, {1, 2}, {0, 1}},
       {"missing observations", {1, 2, 3}, first, {kGap, NAN, 0}, kJanuary, {3}, {2}},
       {"missing simulated values", {1, kGap, 3}, first, {0, 0, 0}, kJanuary, {1, 3}, {0, 2}},
+      {"steps as far apart as may be", {5, 7}, noon, {0, 0, 0}, {first, {2001, 1, 31}, 24.0}, {6}, {0.5}},
+      {"steps too far apart",
+       {5, 7, 9},
+       {2001, 1, 2},
+       {1, 1, 1, 1},
+       {first, {2001, 1, 31}, 23.9},
+       {5, 7, 9},
+       {0, 1, 2}},
       {"a simulation that starts later", {5, 6}, {2001, 1, 2}, {0, 0, 0, 0}, kJanuary, {5, 6}, {0, 1}},
-      {"a simulation that starts in between", {5, 7}, {2000, 12, 31, 12}, {0, 0, 0}, kJanuary, {6}, {0.5}}};
+      {"a simulation that starts in between", {5, 7}, noon, {0, 0, 0}, kJanuary, {6}, {0.5}}};
   for (const auto& [name, simulated, start, observed, period, used, times] : cases) {
     SCOPED_TRACE(name);
     MemoryTimeSeries simulation = daily(simulated, start);
@@ -99,6 +109,15 @@ TEST(MeasureStatistics, UsesTheObservationsThatCount) {
     EXPECT_EQ(s.times, times);
     EXPECT_EQ(s.peakDifference, 0.0F);
   }
+  MemoryTimeSeries simulation = daily({5, 7}, noon);
+  MemoryTimeSeries observation = daily({0, 0});
+  EXPECT_FALSE(hasPairs(measure(), {first, {2001, 1, 31}, 23.9}, simulation, observation)) << "steps too far apart";
+  std::vector<double> values;
+  const ObservedSeries observed = readObservedSeries(0, measure(), kJanuary, SeriesPrecision::exact, observation);
+  appendSimulatedValues(observed, measure(), SeriesPrecision::exact, 24.0 / 24, simulation, values);
+  appendSimulatedValues(observed, measure(), SeriesPrecision::exact, 23.9 / 24, simulation, values);
+  EXPECT_EQ(values.at(0), 6.0);
+  EXPECT_TRUE(std::isnan(values.at(4)));
 }
 
 TEST(MeasureStatistics, AxesThatStartAtDifferentTimesMeetWithoutRounding) {
