@@ -21,7 +21,7 @@ void EvaluationLedger::begin(std::span<const ParameterSet> sets, DispatchMode mo
 }
 
 void EvaluationLedger::replay(std::size_t place, EvaluationResult result) {
-  const PairsFound found = initialPairs_.take(result);
+  const RunComparison found = initialRun_.take(result);
   observer_.evaluationReplayed(sets_[place], result);
   tell(found);
   store(place, std::move(result));
@@ -41,7 +41,7 @@ void EvaluationLedger::store(std::size_t place, EvaluationResult result) {
 std::optional<std::size_t> EvaluationLedger::takeNext() {
   while (next_ < sets_.size() && isFinished_[next_]) ++next_;
   if (next_ == sets_.size()) return std::nullopt;
-  if (openCount_ > 0 && initialPairs_.isAwaited()) return std::nullopt;
+  if (openCount_ > 0 && initialRun_.isAwaited()) return std::nullopt;
   ++openCount_;
   return next_++;
 }
@@ -67,9 +67,9 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
   }
   std::optional<EvaluationResult> known;  // a repeated run has its row already, which is kept
   if (earlier_ != nullptr) known = earlier_->take(result.number, sets_[place]);
-  PairsFound found;
+  RunComparison found;
   if (!known) {
-    found = initialPairs_.take(result);
+    found = initialRun_.take(result);
     observer_.recordEvaluation(sets_[place], result);
   }
   observer_.message(progress::completedMessage(result.number, outcome));
@@ -83,8 +83,8 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
   store(place, std::move(result));
 }
 
-void EvaluationLedger::tell(const PairsFound& found) {
-  if (!found.isEmpty()) observer_.pairsFound(found);
+void EvaluationLedger::tell(const RunComparison& found) {
+  if (!found.isEmpty()) observer_.runCompared(found);
 }
 
 void EvaluationLedger::warnOfUnusedObservations(const EvaluationResult& result) {

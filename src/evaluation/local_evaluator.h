@@ -27,6 +27,12 @@ class LocalEvaluator final : public Evaluator {
   void settleAggregates(std::span<EvaluationResult> sample) override;
 
  private:
+  /// What is in a slot.
+  struct Running {
+    std::size_t place = 0;                  ///< index in the batch of the set
+    std::optional<EvaluationResult> ended;  ///< waits for the initial run, see EvaluationLedger::judge()
+  };
+
   void startInFreeSlots();
   /// Starts the next set on the free slot; sets that cannot be run get their result at once and are skipped.
   void startNext(int slot);
@@ -37,7 +43,7 @@ class LocalEvaluator final : public Evaluator {
   ModelRunner& runner_;
   EvaluationObserver& observer_;
   EvaluationLedger ledger_;
-  std::vector<std::optional<std::size_t>> slots_;  ///< index in the batch of the set that runs in each slot
+  std::vector<std::optional<Running>> slots_;
 };
 
 }  // namespace mirevo

@@ -7,7 +7,7 @@
 
 #include "evaluation/equal_measures.h"
 #include "evaluation/evaluation_result.h"
-#include "evaluation/initial_pairs.h"
+#include "evaluation/initial_run.h"
 #include "evaluation/saved_files.h"
 #include "evaluation/shown_runs.h"
 #include "measures/measure_statistics.h"
@@ -51,8 +51,8 @@ class ModelRunner final {
   /// Why the set cannot be run; empty if it can.
   std::optional<EvaluationFailure> findUnrunnable(std::span<const double> set);
 
-  /// From now on a model run with less than the least share of these pairs is a failed evaluation.
-  void requirePairs(RequiredPairs required) { requiredPairs_ = std::move(required); }
+  /// From now on a model run with less than the least share of its pairs is a failed evaluation.
+  void setStandard(InitialStandard standard) { standard_ = std::move(standard); }
 
   /// Builds the full parameter vector, removes the results of the slot's last run, writes the parameter files and
   /// starts the batch; or returns why the set is not run. Throws FatalError when a file cannot be removed or written.
@@ -83,8 +83,8 @@ class ModelRunner final {
   const std::vector<ParameterTemplate>& templates() const { return templates_; }
   /// A check for a model that ignores its parameters, for the evaluations of a run.
   EqualMeasures equalMeasures() const;
-  /// A comparison of the pairs of model runs, for the evaluations of a run.
-  InitialPairs initialPairs() const;
+  /// A comparison of model runs with the initial one, for the evaluations of a run.
+  InitialRun initialRun() const;
   /// templateDoubts() of all templates.
   const std::vector<std::string>& templateWarnings() const { return templateWarnings_; }
 
@@ -109,7 +109,10 @@ class ModelRunner final {
   /// Fills in the measures and simulated values and leaves the series open; returns a failure if the model's output
   /// cannot be used.
   std::optional<EvaluationFailure> readMeasures(int slot, EvaluationResult& result);
-  std::optional<EvaluationFailure> readSeriesMeasure(int slot, std::size_t measure, EvaluationResult& result);
+  std::optional<EvaluationFailure> readSeriesMeasure(int slot, std::size_t measure, const FileForm& form,
+                                                     EvaluationResult& result);
+  /// Whether the initial run may show that the result is no whole one, see InitialRun::judge().
+  bool mayBeCutOff(const EvaluationResult& result) const;
   std::optional<EvaluationFailure> findLackOfPairs(std::size_t measure, std::size_t count, int slot) const;
   void noteUnusedObservations(std::size_t measure, const MeasureStatistics& statistics, EvaluationResult& result) const;
   EvaluationFailure makeFailure(EvaluationFailure::Kind kind, std::string reason, int slot) const;
@@ -127,7 +130,7 @@ class ModelRunner final {
   std::vector<ObservedSeries> observedSeries_;
   std::vector<std::size_t> shownMeasures_;
   ShownRuns shownRuns_;
-  RequiredPairs requiredPairs_;
+  InitialStandard standard_;
   std::vector<SlotFiles> slots_;
 };
 

@@ -70,9 +70,10 @@ std::string findDecimalComma(std::string_view content, std::size_t neededCount) 
 
 }  // namespace
 
-std::optional<std::vector<double>> parseMeasureFile(const std::string& sourceName, std::string_view content,
-                                                    std::size_t neededCount, std::string& reason) {
-  std::vector<double> numbers;
+std::optional<MeasureFile> parseMeasureFile(const std::string& sourceName, std::string_view content,
+                                            std::size_t neededCount, std::string& reason) {
+  MeasureFile file;
+  file.endsLine = endsLine(content);
   Words words(content, " \t,;\r");
   for (std::string_view word = words.next(); !word.empty(); word = words.next()) {
     const std::optional<double> number = parseReal(word);
@@ -81,7 +82,7 @@ std::optional<std::vector<double>> parseMeasureFile(const std::string& sourceNam
                            word.substr(0, kLongestQuoted));
       return std::nullopt;
     }
-    numbers.push_back(*number);
+    file.numbers.push_back(*number);
   }
   if (const std::string ambiguous = findDecimalComma(content, neededCount); !ambiguous.empty()) {
     reason = fmt::format(
@@ -90,11 +91,10 @@ std::optional<std::vector<double>> parseMeasureFile(const std::string& sourceNam
         sourceName, ambiguous);
     return std::nullopt;
   }
-  return numbers;
+  return file;
 }
 
-std::optional<std::vector<double>> readMeasureFile(const std::string& fileName, std::size_t neededCount,
-                                                   std::string& reason) {
+std::optional<MeasureFile> readMeasureFile(const std::string& fileName, std::size_t neededCount, std::string& reason) {
   std::string systemReason;
   const std::optional<std::string> content = readTextFile(fileName, systemReason);
   if (!content) {

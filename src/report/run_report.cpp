@@ -17,6 +17,7 @@
 #include "common/run_files.h"
 #include "common/version.h"
 #include "evaluation/chosen_evaluations.h"
+#include "evaluation/initial_run.h"
 #include "measures/period_series.h"
 #include "parameters/parameter_model.h"
 #include "report/page/page_template.h"
@@ -51,7 +52,7 @@ class ReportBuilder final {
   void addEvaluations();
   void findBestAndInitial();
   void addMeasures();
-  void noteFewerPairsOfBest();
+  void noteDifferencesOfBest();
   void addFailures();
   void addSeries();
   void addAnalyses();
@@ -99,7 +100,7 @@ ReportData ReportBuilder::build() {
   findBestAndInitial();
   data_.parameters = reportedParameters(config_, parameters_, best_);
   addMeasures();
-  noteFewerPairsOfBest();
+  noteDifferencesOfBest();
   addFailures();
   addSeries();
   addAnalyses();
@@ -198,22 +199,16 @@ void ReportBuilder::addMeasures() {
 }
 
 /// In a run that has come to its end the closing lines of its results say so.
-void ReportBuilder::noteFewerPairsOfBest() {
+void ReportBuilder::noteDifferencesOfBest() {
   if (best_ == nullptr || !data_.summary.empty()) return;
   const PairsByNumber pairs =
       readPairs(filePrefix_, config_.task->facts().resultFiles).content.value_or(PairsByNumber{});
   const auto ofBest = pairs.find(best_->number);
   if (ofBest == pairs.end()) return;
-  for (const MeasurePairs& found : ofBest->second) {
-    const std::vector<MeasurePairs>& initial = pairs.begin()->second;
-    const auto same = std::find_if(initial.begin(), initial.end(),
-                                   [&found](const MeasurePairs& other) { return other.measure == found.measure; });
-    if (same == initial.end() || found.count >= same->count || found.measure >= config_.measures.size()) continue;
-    note(fmt::format(
-        "The best evaluation, No. {}, is judged by fewer observations than the initial run: output "
-        "measure \"{}\" has {} pairs, {} in the initial run, No. {}.",
-        best_->number, config_.measures[found.measure].name, found.count, same->count, pairs.begin()->first));
-  }
+  const auto& [initialNumber, initial] = *pairs.begin();
+  const auto differences = findDifferences(best_->number, ofBest->second, initialNumber, initial,
+                                           measureSources(config_.measures, config_.measureFile, config_.baseFolder));
+  for (const std::string& text : sentencesOnBest(best_->number, differences)) note(text + ".");
 }
 
 void ReportBuilder::addFailures() {

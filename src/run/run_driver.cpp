@@ -351,9 +351,9 @@ std::vector<std::string> RunDriver::keepStatistics() {
 std::vector<std::string> RunDriver::closingLines(const Ending& ending) const {
   std::vector<std::string> lines{ending.closingLine, "Ended: " + ending.time};
   if (!reporter_) return lines;
-  const std::vector<std::string> fewerPairs = reporter_->fewerPairsLines();
+  const std::vector<std::string> differences = reporter_->differenceLines();
   if (!reporter_->best()) {
-    lines.insert(lines.end(), fewerPairs.begin(), fewerPairs.end());
+    lines.insert(lines.end(), differences.begin(), differences.end());
     return lines;
   }
   const std::vector<std::string> scales = aggregator_->scaleLines();
@@ -365,8 +365,8 @@ std::vector<std::string> RunDriver::closingLines(const Ending& ending) const {
   for (std::size_t i = 0; i < names.size(); ++i) {
     lines.push_back(fmt::format("Best {} = {}", names[i], formatReal(best.parameterValues[i])));
   }
-  if (const std::string text = reporter_->fewerPairsOfBest(); !text.empty()) lines.push_back("Warning: " + text);
-  lines.insert(lines.end(), fewerPairs.begin(), fewerPairs.end());
+  for (const std::string& text : reporter_->differencesOfBest()) lines.push_back("Warning: " + text);
+  lines.insert(lines.end(), differences.begin(), differences.end());
   return lines;
 }
 
@@ -424,7 +424,7 @@ void RunDriver::reportRun() {
 void RunDriver::finish(const TaskOutcome& outcome) {
   results_->close();
   reporter_->settle(*aggregator_);
-  warnOfFewerPairs();
+  warnOfDifferences();
   results_->writeTables(outcome.tables);
   const Ending ending{RunStage::finished, outcome.terminationMessage, outcome.terminationMessage};
   if (const auto unwritten = closeResults(ending, outcome.report)) {
@@ -480,17 +480,13 @@ void RunDriver::logFailures() {
   for (const std::string& line : reporter_->failures().lines()) state_.log.line(line);
 }
 
-/// Says how many evaluations are judged by fewer observations than the initial run; to the user, too, if the best is
-/// one of them.
-void RunDriver::warnOfFewerPairs() {
+/// Says how many evaluations differ from the initial run; to the user, too, if the best is one of them.
+void RunDriver::warnOfDifferences() {
   if (!reporter_) return;
-  const std::size_t compared = reporter_->numbersWithPairs().size();
-  if (compared < 2) return;
-  const std::size_t count = compared - 1;
-  state_.log.warning(fmt::format("{} judged by fewer observations than the initial run: the end of {} names {}",
-                                 count == 1 ? "1 evaluation is" : fmt::format("{} evaluations are", count),
-                                 fileNameOf(results_->table().path()), count == 1 ? "it" : "them"));
-  if (const std::string text = reporter_->fewerPairsOfBest(); !text.empty()) warn(text);
+  for (const std::string& text : reporter_->differenceCounts("the end of " + fileNameOf(results_->table().path()))) {
+    state_.log.warning(text);
+  }
+  for (const std::string& text : reporter_->differencesOfBest()) warn(text);
 }
 
 /// Nothing that goes wrong here may hide why the run ended.
@@ -516,7 +512,7 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
     }
     if (!details.empty()) explained += "\n" + details;
     statistics = keepStatistics();
-    warnOfFewerPairs();
+    warnOfDifferences();
     endLogInError(text, details);
     showMessage(explained);
   }
@@ -545,7 +541,7 @@ void RunDriver::endLogInError(std::string_view message, std::string_view details
 int RunDriver::endCancelled(std::string_view message) {
   showMessage(message, {}, MessageType::information);
   const std::vector<std::string> statistics = keepStatistics();
-  warnOfFewerPairs();
+  warnOfDifferences();
   if (!statistics.empty()) {
     state_.log.line("");
     state_.log.line(message);

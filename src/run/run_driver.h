@@ -76,7 +76,7 @@ class RunDriver final {
   void reportRun();
   void finish(const TaskOutcome& outcome);
   void logFailures();
-  void warnOfFewerPairs();
+  void warnOfDifferences();
   int endInError(std::string_view message, std::string_view detail);
   void endLogInError(std::string_view message, std::string_view details);
   int endCancelled(std::string_view message);

@@ -1,5 +1,6 @@
 #include "run/run_reporter.h"
 
+#include <algorithm>
 #include <cmath>
 
 #include <fmt/core.h>
@@ -12,7 +13,13 @@
 namespace mirevo {
 namespace {
 
-constexpr std::size_t kMostLinesOfFewerPairs = 20;
+/// Of each kind in the result file; as warnings in the log, behind which the others are plain lines.
+constexpr int kMostDifferencesShown = 20;
+
+const DifferenceTexts& textsOf(RunDifference::Kind kind) {
+  const std::span<const DifferenceTexts> all = differenceTexts();
+  return *std::find_if(all.begin(), all.end(), [kind](const DifferenceTexts& texts) { return texts.kind == kind; });
+}
 
 }  // namespace
 
@@ -66,47 +73,73 @@ void RunReporter::evaluationReplayed(std::span<const double> set, const Evaluati
   }
 }
 
-void RunReporter::pairsFound(const PairsFound& found) {
+void RunReporter::runCompared(const RunComparison& found) {
   if (found.initialNumber != 0) initialRun_ = found.initialNumber;
   for (const std::string& line : found.initialLines) state_.log.line(line);
-  for (const FewerPairs& fewer : found.fewer) {
-    state_.log.line(fmt::format("   {}: {}", progress::nameOfEvaluation(fewer.number), fewer.text));
-    fewer_.insert_or_assign({fewer.number, fewer.measure}, fewer);
+  for (const RunDifference& difference : found.differences) {
+    const std::string text = fmt::format("{}: {}", progress::nameOfEvaluation(difference.number), difference.text);
+    const bool isWarning = textsOf(difference.kind).isWarnedOf && differencesWarnedOf_ < kMostDifferencesShown;
+    if (isWarning) {
+      ++differencesWarnedOf_;
+      state_.log.warning(text);
+    } else {
+      state_.log.line("   " + text);
+    }
+    differences_.insert_or_assign({difference.number, difference.measure, difference.kind}, difference);
   }
+  if (!found.doubtOfInitial.empty()) state_.log.warning(found.doubtOfInitial);
 }
 
-std::vector<std::string> RunReporter::fewerPairsLines() const {
+std::vector<std::string> RunReporter::differenceLines() const {
   std::vector<std::string> lines;
-  std::set<int> shown;
-  std::set<int> all;
-  for (const auto& [key, fewer] : fewer_) {
-    all.insert(key.first);
-    if (lines.size() == kMostLinesOfFewerPairs) continue;
-    shown.insert(key.first);
-    lines.push_back(fmt::format("Fewer pairs: evaluation {}: {}", fewer.number, fewer.text));
-  }
-  if (all.size() > shown.size()) {
-    lines.push_back(fmt::format("Fewer pairs: {} more evaluations{}", all.size() - shown.size(),
+  for (const DifferenceTexts& texts : differenceTexts()) {
+    std::set<int> shown;
+    std::set<int> all;
+    int count = 0;
+    for (const auto& [key, difference] : differences_) {
+      if (difference.kind != texts.kind) continue;
+      all.insert(difference.number);
+      if (count == kMostDifferencesShown) continue;
+      ++count;
+      shown.insert(difference.number);
+      lines.push_back(fmt::format("{}: evaluation {}: {}", texts.title, difference.number, difference.text));
+    }
+    if (all.size() == shown.size()) continue;
+    lines.push_back(fmt::format("{}: {} more evaluations{}", texts.title, all.size() - shown.size(),
                                 pairs_ == nullptr ? "" : ", see " + fileNameOf(pairs_->path())));
   }
   return lines;
 }
 
-std::string RunReporter::fewerPairsOfBest() const {
-  if (!best()) return {};
-  std::string found;
-  for (const auto& [key, fewer] : fewer_) {
-    if (key.first == best()->number) found.append(found.empty() ? "" : "; ").append(fewer.text);
+std::vector<std::string> RunReporter::differenceCounts(std::string_view where) const {
+  std::vector<std::string> sentences;
+  for (const DifferenceTexts& texts : differenceTexts()) {
+    std::set<int> numbers;
+    for (const auto& [key, difference] : differences_) {
+      if (difference.kind == texts.kind) numbers.insert(difference.number);
+    }
+    if (numbers.empty()) continue;
+    const bool isOne = numbers.size() == 1;
+    sentences.push_back(fmt::format("{} {}: {} names {}",
+                                    isOne ? "1 evaluation" : fmt::format("{} evaluations", numbers.size()),
+                                    isOne ? texts.ofOne : texts.ofSeveral, where, isOne ? "it" : "them"));
   }
-  if (found.empty()) return {};
-  return fmt::format("The best evaluation, No. {}, is judged by fewer observations than the initial run: {}",
-                     best()->number, found);
+  return sentences;
+}
+
+std::vector<std::string> RunReporter::differencesOfBest() const {
+  if (!best()) return {};
+  std::vector<RunDifference> ofBest;
+  for (const auto& [key, difference] : differences_) {
+    if (difference.number == best()->number) ofBest.push_back(difference);
+  }
+  return sentencesOnBest(best()->number, ofBest);
 }
 
 std::set<int> RunReporter::numbersWithPairs() const {
   if (initialRun_ == 0) return {};
   std::set<int> numbers{initialRun_};
-  for (const auto& [key, fewer] : fewer_) numbers.insert(key.first);
+  for (const auto& [key, difference] : differences_) numbers.insert(difference.number);
   return numbers;
 }
 

@@ -4,7 +4,7 @@
 #include <optional>
 #include <set>
 #include <string>
-#include <utility>
+#include <tuple>
 #include <vector>
 
 #include "algorithms/searches/search_algorithm.h"
@@ -38,7 +38,7 @@ class RunReporter final : public EvaluationObserver {
   void recordEvaluation(std::span<const double> set, const EvaluationResult& result) override;
   void evaluationFinished(std::span<const double> set, const EvaluationResult& result) override;
   void evaluationReplayed(std::span<const double> set, const EvaluationResult& result) override;
-  void pairsFound(const PairsFound& found) override;
+  void runCompared(const RunComparison& found) override;
   bool isCancelled() override { return state_.progress.isCancelled(); }
 
   /// At the end of a run: fills in the aggregates of evaluations made before the transformation of the objective
@@ -53,13 +53,14 @@ class RunReporter final : public EvaluationObserver {
   /// The number of the initial evaluation; empty before an evaluation has succeeded.
   const std::optional<int>& initial() const { return initial_.number(); }
 
-  /// The evaluations that have fewer pairs than the initial run: the first of them a line each, and how many more.
-  /// Empty without any.
-  std::vector<std::string> fewerPairsLines() const;
-  /// A sentence that says so of the best evaluation; empty if it has all of them.
-  std::string fewerPairsOfBest() const;
-  /// The initial run and the evaluations that have fewer pairs; empty as long as it is not known which is the initial
-  /// one.
+  /// The evaluations that differ from the initial run: of each kind of difference the first a line each, and how many
+  /// more. Empty without any.
+  std::vector<std::string> differenceLines() const;
+  /// How many evaluations differ, a sentence for each kind of difference; `where` names them.
+  std::vector<std::string> differenceCounts(std::string_view where) const;
+  /// Sentences that say so of the best evaluation.
+  std::vector<std::string> differencesOfBest() const;
+  /// The initial run and the evaluations that differ; empty as long as it is not known which is the initial one.
   std::set<int> numbersWithPairs() const;
 
   int evaluationCount() const { return evaluationCount_; }
@@ -96,8 +97,10 @@ class RunReporter final : public EvaluationObserver {
   int failedCount_ = 0;
   int replayedCount_ = 0;
   FailureSummary failures_;
-  int initialRun_ = 0;                                       ///< with whose pairs others are compared
-  std::map<std::pair<int, std::size_t>, FewerPairs> fewer_;  ///< by evaluation and measure
+  int initialRun_ = 0;  ///< with which others are compared
+  /// By evaluation, measure and kind.
+  std::map<std::tuple<int, std::size_t, RunDifference::Kind>, RunDifference> differences_;
+  int differencesWarnedOf_ = 0;
 };
 
 }  // namespace mirevo

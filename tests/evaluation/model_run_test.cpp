@@ -91,6 +91,8 @@ TEST_F(ModelRunTest, MeasureFileValuesAreTakenByTheirNumber) {
     EXPECT_EQ(result.ok(), reason.empty()) << content;
     if (result.ok()) {
       EXPECT_THAT(result.measureValues, ElementsAre(8.5));
+      EXPECT_EQ(result.pairs.at(0).file.numberCount, 2U);
+      EXPECT_FALSE(result.pairs.at(0).file.endsLine);
     } else {
       EXPECT_EQ(result.failure->kind, Kind::resultsNotReadable);
       EXPECT_THAT(result.failure->reason, StartsWith(reason));

@@ -11,11 +11,14 @@
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
   const std::string_view text(reinterpret_cast<const char*>(data), size);
   std::string reason;
-  const auto numbers = mirevo::parseMeasureFile("m.txt", text, 1, reason);
-  require(numbers.has_value() || reason.starts_with("m.txt:"));
-  if (!numbers) return 0;
-  for (const double number : *numbers) require(std::isfinite(number));
-  require(mirevo::parseMeasureFile("m.txt", text, numbers->size(), reason) == numbers);
-  require(mirevo::parseMeasureFile("m.txt", std::string(text) + "\n", 1, reason) == numbers);
+  const auto file = mirevo::parseMeasureFile("m.txt", text, 1, reason);
+  require(file.has_value() || reason.starts_with("m.txt:"));
+  if (!file) return 0;
+  const std::vector<double>& numbers = file->numbers;
+  for (const double number : numbers) require(std::isfinite(number));
+  const auto again = mirevo::parseMeasureFile("m.txt", text, numbers.size(), reason);
+  require(again && again->numbers == numbers);
+  const auto ended = mirevo::parseMeasureFile("m.txt", std::string(text) + "\n", 1, reason);
+  require(ended && ended->numbers == numbers && ended->endsLine);
   return 0;
 }

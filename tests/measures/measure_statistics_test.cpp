@@ -193,10 +193,10 @@ TEST(MeasureStatistics, ATextColumnIsRefusedWithItsPlace) {
 
 TEST(MeasureFile, FreeFormat) {
   std::string reason;
-  const auto numbers = parseMeasureFile("m.txt", "# measures\r\n1.5, -2 ;\t3D2\r\n\n.25# the last\n,,7", 1, reason);
-  ASSERT_TRUE(numbers.has_value()) << reason;
-  EXPECT_THAT(*numbers, ElementsAre(1.5, -2.0, 300.0, 0.25, 7.0));
-  EXPECT_THAT(parseMeasureFile("m.txt", "", 1, reason).value(), IsEmpty());
+  const auto file = parseMeasureFile("m.txt", "# measures\r\n1.5, -2 ;\t3D2\r\n\n.25# the last\n,,7", 1, reason);
+  ASSERT_TRUE(file.has_value()) << reason;
+  EXPECT_THAT(file->numbers, ElementsAre(1.5, -2.0, 300.0, 0.25, 7.0));
+  EXPECT_THAT(parseMeasureFile("m.txt", "", 1, reason).value().numbers, IsEmpty());
   EXPECT_FALSE(parseMeasureFile("m.txt", "1 2\n3, NaN\n", 1, reason).has_value());
   EXPECT_EQ(reason, "m.txt:2:4: expected a number, found \"NaN\"");
   EXPECT_FALSE(readMeasureFile("no_such_folder/m.txt", 1, reason).has_value());
@@ -214,8 +214,8 @@ TEST(MeasureFile, ACommaThatMayBeADecimalOneIsRefused) {
   };
   for (const auto& [content, needed, count] : cases) {
     std::string reason;
-    const auto numbers = parseMeasureFile("m.txt", content, needed, reason);
-    EXPECT_EQ(numbers ? numbers->size() : 0, count) << content << reason;
+    const auto file = parseMeasureFile("m.txt", content, needed, reason);
+    EXPECT_EQ(file ? file->numbers.size() : 0, count) << content << reason;
   }
   std::string reason;
   parseMeasureFile("m.txt", "7 8\n 0,153", 1, reason);

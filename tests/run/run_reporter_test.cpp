@@ -95,36 +95,54 @@ TEST_F(RunReporterTest, AggregatesUnknownOnArrivalAreFilledInWhenTheTransformati
   }
 }
 
-TEST_F(RunReporterTest, EvaluationsThatMeetFewerObservationsThanTheInitialRunAreNamed) {
-  const MeasurePairs initial{0, 48, 0, 86400, 2 * 86400, {0.1, 0.5, 1.0}, {-1.0, 1.0 / 3.0, 2.0}};
+TEST_F(RunReporterTest, EvaluationsThatDifferFromTheInitialRunAreNamed) {
+  const FileForm form{.endsLine = false, .stepCount = 48, .gapStart = 86400, .gapEnd = 90000};
+  const MeasurePairs initial{0, 48, 0, 86400, 2 * 86400, {0.1, 0.5, 1.0}, {-1.0, 1.0 / 3.0, 2.0}, form};
+  MeasurePairs numbers;
+  numbers.measure = 1;
+  numbers.file.numberCount = 3;
   MeasurePairs two = initial;
   two.count = 2;
   two.missingCount = 46;
-  const auto arrive = [this](int number, double objective, const MeasurePairs& pairs) {
-    report({.number = number, .objectiveValues = {objective}, .aggregate = objective, .pairs = {pairs}});
+  const auto arrive = [this, &numbers](int number, double objective, const MeasurePairs& pairs) {
+    report({.number = number, .objectiveValues = {objective}, .aggregate = objective, .pairs = {pairs, numbers}});
   };
   arrive(3, 5.0, initial);  // before it is known which run is the initial one
   arrive(1, 6.0, initial);
   EXPECT_THAT(reporter_.numbersWithPairs(), testing::IsEmpty());
-  reporter_.pairsFound({1, {"as many as 48"}, {}});
-  EXPECT_EQ(reporter_.fewerPairsOfBest(), "");
+  using Kind = RunDifference::Kind;
+  reporter_.runCompared({1, {"as many as 48"}, {}, {}});
+  EXPECT_THAT(reporter_.differencesOfBest(), testing::IsEmpty());
   for (int number = 4; number < 26; ++number) {
     arrive(number, number == 7 ? 1.0 : 2.0, two);
-    reporter_.pairsFound({0, {}, {{number, 0, 2, 48, "2 of 48"}}});
+    reporter_.runCompared({0, {}, {{number, 0, Kind::fewerPairs, "2 of 48"}, {number, 0, Kind::gap, "a day"}}, {}});
   }
-  EXPECT_EQ(reporter_.fewerPairsOfBest(),
-            "The best evaluation, No. 7, is judged by fewer observations than the initial run: 2 of 48");
-  const std::vector<std::string> lines = reporter_.fewerPairsLines();
-  ASSERT_EQ(lines.size(), 21U);
+  reporter_.runCompared({0, {}, {{7, 1, Kind::otherCount, "3 numbers"}}, {}});
+  EXPECT_THAT(reporter_.differencesOfBest(),
+              testing::ElementsAre(
+                  "The best evaluation, No. 7, is judged by fewer observations than the initial run: 2 of 48",
+                  "The best evaluation, No. 7, has a longer gap in its simulated steps than the initial run: a day",
+                  "The best evaluation, No. 7, has another count of numbers than the initial run: 3 numbers"));
+  EXPECT_THAT(reporter_.differenceCounts("s.dat"),
+              testing::ElementsAre(
+                  "22 evaluations are judged by fewer observations than the initial run: s.dat names them",
+                  "22 evaluations have a longer gap in their simulated steps than the initial run: s.dat names them",
+                  "1 evaluation has another count of numbers than the initial run: s.dat names it"));
+  const std::vector<std::string> lines = reporter_.differenceLines();
+  ASSERT_EQ(lines.size(), 43U);
   EXPECT_EQ(lines.front(), "Fewer pairs: evaluation 4: 2 of 48");
-  EXPECT_EQ(lines.back(), "Fewer pairs: 2 more evaluations, see s_Pairs.dat");
+  EXPECT_EQ(lines[20], "Fewer pairs: 2 more evaluations, see s_Pairs.dat");
+  EXPECT_EQ(lines[21], "Gap: evaluation 4: a day");
+  EXPECT_EQ(lines.back(), "Count of numbers: evaluation 7: 3 numbers");
   EXPECT_THAT(folder_.read("s.log"),
-              AllOf(HasSubstr("as many as 48\n"), HasSubstr("   Evaluation of parameter set No. 7: 2 of 48\n")));
+              AllOf(HasSubstr("as many as 48\n"), HasSubstr("   Evaluation of parameter set No. 7: 2 of 48\n"),
+                    HasSubstr("\nWarning: Evaluation of parameter set No. 23: a day\n"),
+                    HasSubstr("\n   Evaluation of parameter set No. 24: a day\n")));
 
-  EXPECT_EQ(pairs_.readEarlier({3, 7, 30}), (PairsByNumber{{3, {initial}}, {7, {two}}}));
+  EXPECT_EQ(pairs_.readEarlier({3, 7, 30}), (PairsByNumber{{3, {initial, numbers}}, {7, {two, numbers}}}));
   std::string reason;
   EXPECT_TRUE(pairs_.finish(reporter_.numbersWithPairs(), reason)) << reason;
-  EXPECT_EQ(pairs_.readEarlier({1, 3, 7}), (PairsByNumber{{1, {initial}}, {7, {two}}}));
+  EXPECT_EQ(pairs_.readEarlier({1, 3, 7}), (PairsByNumber{{1, {initial, numbers}}, {7, {two, numbers}}}));
 }
 
 TEST_F(RunReporterTest, AnEvaluationReachesResultFileLogProgressAndTheFileOfFailures) {

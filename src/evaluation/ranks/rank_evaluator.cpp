@@ -24,7 +24,7 @@ RankEvaluator::RankEvaluator(ModelRunner& runner, Job& job, EvaluationObserver& 
     : runner_(runner),
       job_(job),
       observer_(observer),
-      ledger_(observer, failedRuns, earlier, runner.equalMeasures(), runner.initialPairs()),
+      ledger_(observer, failedRuns, earlier, runner.equalMeasures(), runner.initialRun()),
       workers_(static_cast<std::size_t>(job.processCount() - 1)) {}
 
 std::vector<EvaluationResult> RankEvaluator::evaluateParameterSets(std::span<const ParameterSet> sets,
@@ -34,6 +34,7 @@ std::vector<EvaluationResult> RankEvaluator::evaluateParameterSets(std::span<con
   while (!ledger_.isComplete()) {
     const auto message = job_.receive(kMasterPollSeconds);
     if (message) handle(*message);
+    finishAnswered();
     stopIfCancelled();
     startOnFreeWorkers();
   }
@@ -52,7 +53,7 @@ void RankEvaluator::startNext(int rank) {
     auto failure = runner_.findUnrunnable(ledger_.set(*place));
     if (!failure) {
       job_.send(rank, static_cast<int>(RankMessage::set),
-                encode(SetMessage{ledger_.numberOf(*place), ledger_.set(*place), ledger_.requiredPairs()}));
+                encode(SetMessage{ledger_.numberOf(*place), ledger_.set(*place), ledger_.standard()}));
       worker(rank).set = *place;
       ledger_.markInitiated(*place);
       return;
@@ -80,17 +81,35 @@ void RankEvaluator::handle(const Message& message) {
 }
 
 void RankEvaluator::takeResult(int rank, ResultMessage message) {
-  const auto place = std::exchange(worker(rank).set, std::nullopt);
-  if (!place) {
+  if (!worker(rank).set || worker(rank).answer) {
     fatalError(kCommunicationFailed, fmt::format("the worker with rank {} sent a result that nobody asked for", rank));
   }
+  worker(rank).answer = std::move(message);
+}
+
+void RankEvaluator::finishAnswered() {
+  int rank = 1;
+  while (rank < job_.processCount()) {
+    Worker& answered = worker(rank);
+    if (answered.answer && ledger_.judge(*answered.set, answered.answer->result)) {
+      finish(answered, rank);
+      rank = 1;  // others may have waited for this one
+    } else {
+      ++rank;
+    }
+  }
+}
+
+void RankEvaluator::finish(Worker& worker, int rank) {
+  const std::size_t place = *std::exchange(worker.set, std::nullopt);
+  ResultMessage message = *std::exchange(worker.answer, std::nullopt);
   EvaluationResult& result = message.result;
   // Only the master knows the transformation determined from the initial sample.
   if (result.ok()) result.aggregate = runner_.aggregator().aggregate(result.objectiveValues);
   if (ledger_.isFolderWanted(result)) {
-    job_.send(rank, static_cast<int>(RankMessage::keepFolder), encode(KeepFolderMessage{ledger_.numberOf(*place)}));
+    job_.send(rank, static_cast<int>(RankMessage::keepFolder), encode(KeepFolderMessage{ledger_.numberOf(place)}));
   }
-  ledger_.finish(*place, std::move(result), message.leftBehind);
+  ledger_.finish(place, std::move(result), message.leftBehind);
 }
 
 void RankEvaluator::failWith(int rank, const FailureMessage& failure) const {

@@ -29,8 +29,9 @@ class RankEvaluator final : public Evaluator {
 
  private:
   struct Worker {
-    std::optional<ReadyMessage> place;  ///< host and process folder; empty until it is ready
-    std::optional<std::size_t> set;     ///< index in the batch of the set that it runs
+    std::optional<ReadyMessage> place;    ///< host and process folder; empty until it is ready
+    std::optional<std::size_t> set;       ///< index in the batch of the set that it runs
+    std::optional<ResultMessage> answer;  ///< waits for the initial run, see EvaluationLedger::judge()
   };
 
   void startOnFreeWorkers();
@@ -38,6 +39,9 @@ class RankEvaluator final : public Evaluator {
   void startNext(int rank);
   void handle(const Message& message);
   void takeResult(int rank, ResultMessage message);
+  /// Finishes the answers that can be judged.
+  void finishAnswered();
+  void finish(Worker& worker, int rank);
   [[noreturn]] void failWith(int rank, const FailureMessage& failure) const;
   void stopIfCancelled();
   Worker& worker(int rank) { return workers_.at(static_cast<std::size_t>(rank - 1)); }

@@ -5,7 +5,7 @@
 
 #include "common/parameter_set.h"
 #include "evaluation/evaluation_result.h"
-#include "evaluation/initial_pairs.h"
+#include "evaluation/initial_run.h"
 
 namespace mirevo {
 
@@ -39,7 +39,7 @@ struct ReadyMessage {
 struct SetMessage {
   int number = 0;  ///< number of the evaluation in the run, from 1
   ParameterSet set;
-  RequiredPairs requiredPairs;
+  InitialStandard standard;
 };
 
 struct ResultMessage {

@@ -29,6 +29,9 @@ class TimeSeriesObject {
   /// Date and time of the first step; empty if the file has no steps.
   virtual std::optional<DateRecord> startTime() const = 0;
   virtual std::optional<float> deleteValue() const = 0;
+  /// Whether the last line of the file has an end, as lines that were not cut off have; true for a format without
+  /// lines.
+  virtual bool endsLine() const { return true; }
   virtual int itemCount() const = 0;
   virtual std::string itemName(int item) const = 0;
 

@@ -92,10 +92,27 @@ TEST_F(RankEvaluatorTest, WorkersWaitForTheInitialRunWhosePairsTheirsNeed) {
   evaluate(master, {2.0, 4.0, 6.0});
   std::vector<std::pair<int, std::vector<std::size_t>>> required;
   for (const Message& message : job_.sent) {
-    required.emplace_back(message.rank, decodeSet(message.content).requiredPairs.initialCounts);
+    required.emplace_back(message.rank, decodeSet(message.content).standard.initialCounts);
   }
   EXPECT_THAT(required, ElementsAre(testing::Pair(1, IsEmpty()), testing::Pair(1, ElementsAre(5)),
                                     testing::Pair(2, ElementsAre(5))));
+}
+
+TEST_F(RankEvaluatorTest, AFileWithoutALineEndWaitsForTheInitialRun) {
+  RankEvaluator& master = makeMaster();
+  becomeReady(1);
+  becomeReady(2);
+  job_.onReceive = [this](double) {
+    if (!job_.arriving.empty() || running_.empty()) return;
+    const int last = running_.rbegin()->first;
+    pairs_ = {{.count = 5}};
+    pairs_[0].file.endsLine = running_.at(last) == 2.0;  // the initial run's, which ends last
+    answer(last);
+  };
+  const auto results = evaluate(master, {2.0, 4.0, 6.0});
+  EXPECT_THAT(measuresOf(results), ElementsAre(1.0, kFailedRunValue, kFailedRunValue));
+  EXPECT_EQ(job_.sent.at(2).rank, 1) << "the other one waits with its folder";
+  EXPECT_EQ(decodeSet(job_.sent.at(2).content).standard.initialNumber, 1);
 }
 
 TEST_F(RankEvaluatorTest, FailedRunsOfAllWorkersCountTogether) {
