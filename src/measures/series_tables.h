@@ -36,6 +36,8 @@ class SeriesTables final {
   /// The file of the measure with this 0-based index; simulation() may be called only between open and release.
   TimeSeriesObject& observation(std::size_t measure);
   TimeSeriesObject& simulation(std::size_t measure);
+  /// Which of simulationFileNames() that is.
+  std::size_t simulationIndex(std::size_t measure) const { return simulationIndex_.at(measure); }
   /// Whether a model run without a simulated value for any observation of the measure in the period is the run's own
   /// fault and not the setup's: the file in the base folder has such values, or has no time steps yet and there are
   /// observations in the period. Told before the first model run, so that it depends on no other run.
