@@ -100,6 +100,7 @@ class ModelRunner final {
   RunComparison runComparison() const;
   /// What the user should know of links in the model's folder, and templateDoubts() of all templates.
   const std::vector<std::string>& warnings() const { return warnings_; }
+  const std::vector<std::string>& seriesWarnings() const { return series_.warnings(); }
 
  private:
   /// Paths of one slot's copies of the model's files.

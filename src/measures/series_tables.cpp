@@ -78,11 +78,16 @@ SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> mea
     std::sort(items.begin(), items.end());
     items.erase(std::unique(items.begin(), items.end()), items.end());
   }
+  const auto open = [&tables](const std::string& name, const std::string& location) {
+    auto series = openTimeSeries(name, location);
+    if (const std::string doubt = series->doubt(); !doubt.empty()) tables.warnings_.push_back(location + doubt);
+    return series;
+  };
   for (std::size_t i = 0; i < observationLocations.size(); ++i) {
-    tables.observations_.push_back(openTimeSeries(tables.observationNames_[i], observationLocations[i]));
+    tables.observations_.push_back(open(tables.observationNames_[i], observationLocations[i]));
   }
   for (std::size_t i = 0; i < simulationLocations.size(); ++i) {
-    tables.simulations_.push_back(openTimeSeries(tables.simulationNames_[i], simulationLocations[i]));
+    tables.simulations_.push_back(open(tables.simulationNames_[i], simulationLocations[i]));
   }
   tables.checkItems(measures, period);
   tables.releaseSimulationFiles();

@@ -38,6 +38,8 @@ class SeriesTables final {
   TimeSeriesObject& simulation(std::size_t measure);
   /// Which of simulationFileNames() that is.
   std::size_t simulationIndex(std::size_t measure) const { return simulationIndex_.at(measure); }
+  /// What seems to be meant in another way in files as they were found at the start, with their locations in the setup.
+  const std::vector<std::string>& warnings() const { return warnings_; }
   /// Whether a model run without a simulated value for any observation of the measure in the period is the run's own
   /// fault and not the setup's: the file in the base folder has such values, or has no time steps yet and there are
   /// observations in the period. Told before the first model run, so that it depends on no other run.
@@ -56,6 +58,7 @@ class SeriesTables final {
   std::vector<std::vector<int>> simulationItems_;  ///< one per simulation file: the item numbers in use
   std::vector<std::unique_ptr<TimeSeriesObject>> observations_;
   std::vector<std::unique_ptr<TimeSeriesObject>> simulations_;
+  std::vector<std::string> warnings_;
 };
 
 /// Creates and opens one file. Throws FatalError with "Error creating TS object for file: " or

@@ -192,6 +192,7 @@ std::string takeSensitivities(const std::string& filePrefix, ReportedSensitivity
   found.parameters = sensitivity.parameters;
   found.outputs = sensitivity.outputs;
   auto row = table.rows.begin();
+  std::size_t observed = 0;  // parameters with a row over the observations
   for (const std::string& parameter : found.parameters) {
     std::vector<double>& derivatives = found.derivatives.emplace_back();
     std::vector<double>& dimensionless = found.dimensionless.emplace_back();
@@ -203,7 +204,7 @@ std::string takeSensitivities(const std::string& filePrefix, ReportedSensitivity
       };
       ranking = number(*composite);
       if ((*row)[*kind] == "observations") {
-        found.isOfObservations = true;
+        ++observed;
         continue;
       }
       if (derivatives.size() == found.outputs.size() || (*row)[*output] != found.outputs[derivatives.size()]) {
@@ -214,7 +215,8 @@ std::string takeSensitivities(const std::string& filePrefix, ReportedSensitivity
     }
     if (derivatives.size() != found.outputs.size()) return damaged;
   }
-  if (row != table.rows.end()) return damaged;
+  found.isOfObservations = observed > 0;
+  if (row != table.rows.end() || (observed > 0 && observed < found.parameters.size())) return damaged;
   for (const std::size_t i : ranked(found.composite)) found.ranking.push_back(found.parameters[i]);
   sensitivity = std::move(found);
   return {};

@@ -186,7 +186,10 @@ void RunDriver::buildModel() {
   // Before the process folders are made, so that a run that cannot be continued changes nothing.
   results_.emplace(config_, parameters_->searchSpace(), filePrefix_);
   results_->requireReplaceableFiles(config_);
-  if (config_.task) config_.task->continueFrom(results_->earlierSearches());
+  if (config_.task) {
+    config_.task->continueFrom(results_->earlierSearches());
+    config_.task->requireSets(parameters_->searchSpace(), parameters_->feasibility());
+  }
   launcher_ = std::make_unique<PosixProcessLauncher>();
   signalState.haltProcesses = haltProcessesFromSignal;
   const int slotCount = state_.job->hasWorkers() ? 0 : config_.simultaneousSimulations;  // the master runs no model
@@ -209,6 +212,7 @@ void RunDriver::logSetup() {
     for (const std::string& text : config_.task->warnings(parameters_->searchSpace())) state_.log.warning(text);
   }
   for (const std::string& text : runner_->warnings()) state_.log.warning(text);
+  for (const std::string& text : runner_->seriesWarnings()) state_.log.warning(text);
   for (const std::string& text :
        unusedParameterWarnings(config_.parameters, config_.constraints, runner_->templates())) {
     state_.log.warning(text);
@@ -254,7 +258,7 @@ void RunDriver::putEarlierReportAside() {
   if (results_->earlierEvaluations() != nullptr && isReportOf(path, config_.task->facts().name.name, reason)) {
     std::filesystem::remove(path, ignored);
   } else {
-    if (!reason.empty() && std::filesystem::exists(path, ignored)) {
+    if (!reason.empty() && reason != std::strerror(ENOENT)) {
       state_.log.warning(fmt::format("{}: {}. Of which task it is is not known", path, reason));
     }
     keepEarlierFile(path, state_.log);

@@ -161,9 +161,9 @@ Expectation expectationOf(const Fault& fault, const FaultyRun& run) {
   // The kind of the setup file is looked at before anything is made beside it, the log included.
   expected.logMayLackMessage = kind == "run log" || (kind == "setup file" && fault.call.first == "stat");
   expected.mayFailEvaluation = kind == "simulated series" || kind == "starting processes" || kind == "batch log";
-  expected.mayBeToldInReport =
-      (kind == "series file" || kind == "failure table" || kind == "run record" || kind == "row checksums") &&
-      (fault.call.first == "read" || fault.call.first == "open-to-read");
+  expected.mayBeToldInReport = (kind == "series file" || kind == "failure table" || kind == "run record" ||
+                                kind == "row checksums" || kind == "restart settings") &&
+                               (fault.call.first == "read" || fault.call.first == "open-to-read");
   expected.mayBeToldBehindLog = kind == "message file";  // its last records follow the log's end
   // Making a folder goes on without knowing what is there, and fails for what is missing.
   if (kind == "saved output files" && fault.call.first == "stat") expected.otherReason = std::strerror(ENOENT);

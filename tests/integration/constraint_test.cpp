@@ -53,19 +53,36 @@ TEST(Constraints, NearTheOptimumCostASearchNoEvaluation) {
 TEST(Constraints, AreTestedBeforeTheFirstRunOfASensitivityAnalysisAndOfScenarios) {
   const ModelFolder folder;
   const std::string none =
-      "\n   None of the scenarios satisfies the constraints: check the constraints and the values\n";
+      "\n   None of the scenarios can be run: check the constraints, the equations and the values\n";
   for (const auto& [settings, equation, said] :
        {std::tuple{RunSettings{.option = 1}, "'a + b + 2.5'",
-                   std::string("5 of 5 sets of the analysis, which are not run and fail: No. 1, 2, 3, 4, 5\n")},
-        {{.option = 1}, "'6.9 + abs(b - 1)'", "2 of 5 sets of the analysis, which are not run and fail: No. 4, 5\n"},
+                   std::string("5 of 5 sets of the analysis are not run and fail, as they violate a constraint or an "
+                               "equation has no finite value: No. 1, 2")},
+        {{.option = 1}, "'6.9 + abs(b - 1)'", "2 of 5 sets of the analysis are not run and fail"},
         {{.option = 0, .scenarios = {"4, 1, 1", "5, 2, 1"}}, "'a + b + 2.5'", none}}) {
     runConstrained(folder, settings);
     folder.editSetup("'a + b'", equation);
     const ProgramResult run = runProgram({folder / "basin.kdx"});
     EXPECT_EQ(run.exitCode, 1);
-    EXPECT_THAT(run.error, AllOf(StartsWith("Mirevo: Constraints are violated by "), HasSubstr(said)));
-    EXPECT_LT(folder.read("basin.log").find("Warning: Constraints are violated by "),
+    EXPECT_THAT(run.error, HasSubstr(said));
+    EXPECT_LT(folder.read("basin.log").find("are not run and fail, as they violate"),
               folder.read("basin.log").find("Evaluation of parameter set No. 1 "));
+  }
+}
+
+TEST(Constraints, ThatNoSetSatisfiesAreToldBeforeAnyFileIsTouched) {
+  for (const auto& [option, results] : {std::pair{2, "basin_Optimisation.dat"}, {3, "basin.dat"}}) {
+    const ModelFolder folder;
+    runConstrained(folder, {.option = option, .maxEvaluations = 12}, option == 3);
+    const std::string expected = folder.read(results);
+    folder.editSetup("'6.9'", "'-1'");
+    for (int start = 1; start <= 2; ++start) {
+      const ProgramResult run = runProgram({folder / "basin.kdx"});
+      EXPECT_THAT(run.error, HasSubstr("Error: No parameter set found that satisfies the constraints\n"));
+      EXPECT_THAT(folder.read("basin.log"), HasSubstr("\nThe run did not begin: no model was run"));
+      EXPECT_EQ(folder.read(results), expected);
+      EXPECT_FALSE(folder.exists("basin.2.log")) << "that of the first refusal";
+    }
   }
 }
 

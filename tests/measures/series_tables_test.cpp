@@ -30,13 +30,14 @@ class SeriesTablesTest : public ::testing::Test {
 };
 
 TEST_F(SeriesTablesTest, MeasuresShareTheFilesTheyNameAlike) {
-  folder_.write("sim2.csv", "time,Q\n2001-01-01,9\n");
+  folder_.write("sim2.csv", "time,hour,Q\n2001-01-01,9,1\n");
   const OutputMeasure fromFile{.interfaceType = InterfaceType::measureFile, .simulation = {folder_ / "not there", 1}};
   const std::vector<OutputMeasure> measures{measure("sim2.csv", "obs.csv"), fromFile, measure("sim.csv", "obs.csv  "),
                                             measure("sim2.csv  ", "obs.csv")};
   SeriesTables tables = SeriesTables::MirevoTSobjectInit(measures, kPeriod);
   EXPECT_THAT(tables.observationFileNames(), ElementsAre((folder_ / "obs.csv")));
   EXPECT_THAT(tables.simulationFileNames(), ElementsAre((folder_ / "sim2.csv"), (folder_ / "sim.csv")));
+  EXPECT_THAT(tables.warnings(), ElementsAre(HasSubstr("sim2.csv: column 2 is called \"hour\" and is read as item")));
   EXPECT_EQ(&tables.observation(0), &tables.observation(2));
   tables.openSimulationFiles(tables.simulationFileNames());
   EXPECT_EQ(&tables.simulation(0), &tables.simulation(3));

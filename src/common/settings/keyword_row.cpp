@@ -21,10 +21,10 @@ std::string ValueRange::text() const {
   return lowest == highest ? fmt::format("{}", lowest) : fmt::format("{} to {}", lowest, highest);
 }
 
-KeywordRow itemCount() {
+KeywordRow itemCount(int least) {
   return unused({.name = kItemCountKeyword,
-                 .defaultValue = "0",
-                 .range = kNonNegative,
+                 .defaultValue = least == 0 ? "0" : "",
+                 .range = {.lowest = double(least)},
                  .meaning = "Number of item sections; exactly so many are read."},
                 KeywordType::integer);
 }

@@ -216,7 +216,8 @@ auto itemName(NameOf) {
   return [](const void* settings) -> std::string { return NameOf{}(*static_cast<const Settings*>(settings)); };
 }
 
-KeywordRow itemCount();
+/// The count of a list; required for one that needs an item.
+KeywordRow itemCount(int least = 0);
 /// A row for a keyword that is known but not used.
 KeywordRow unused(KeywordFacts facts, KeywordType type);
 

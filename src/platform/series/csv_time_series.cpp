@@ -1,9 +1,12 @@
 #include "platform/series/csv_time_series.h"
 
 #include <algorithm>
+#include <array>
 #include <charconv>
 #include <cmath>
 #include <utility>
+
+#include <fmt/core.h>
 
 #include "common/calendar.h"
 #include "common/encoding.h"
@@ -37,10 +40,30 @@ bool isTimeOfDay(std::string_view cell) {
   return cell.empty() || cell.front() == ':';
 }
 
+constexpr std::string_view kOneColumn = "the date and the time of day must be in one column, such as 2001-01-31 12:30";
+
 /// What goes behind a fault in a row, if the cell that comes after the date or in place of a value is a time of day.
 std::string hintOfTwoColumns(std::string_view cell) {
-  if (!isTimeOfDay(cell)) return {};
-  return "; the date and the time of day must be in one column, such as 2001-01-31 12:30";
+  return isTimeOfDay(cell) ? fmt::format("; {}", kOneColumn) : std::string{};
+}
+
+/// The same for the cell after a date that occurs a second time, without a time of day.
+std::string hintOfHour(std::string_view cell) {
+  std::string_view rest = cell;
+  const auto hour = takeNumber(rest, 1, 2);
+  if (!hour || *hour > 24 || !rest.empty()) return {};
+  return fmt::format("; if {} is the hour: {}", cell, kOneColumn);
+}
+
+/// Whether a column with this heading seems to hold the time of day: "Hour", "HH:MM", "time (UTC)".
+bool isHeadingOfHours(std::string_view heading) {
+  constexpr std::array<std::string_view, 10> kHeadings = {"hour", "hours",     "hourofday", "hr",   "hrs",
+                                                          "time", "timeofday", "hh",        "hhmm", "hhmmss"};
+  std::string letters;
+  for (const char c : heading.substr(0, heading.find_first_of("([{"))) {
+    if (c != ' ' && c != '_' && c != '-' && c != ':' && c != '.') letters += c;
+  }
+  return std::find(kHeadings.begin(), kHeadings.end(), toLowerAscii(letters)) != kHeadings.end();
 }
 
 }  // namespace
@@ -164,8 +187,10 @@ bool CsvTimeSeries::readRow(const char* line, const char* lineEnd, csv::DateScan
   if (!times_.empty() && *now <= second) {
     const char* const next = std::min(at + 1, lineEnd);
     const std::string_view after = csv::cellText(next, csv::endOfCell(next, lineEnd, separator_));
+    // With a single item the cell is the value.
+    const bool mayBeHour = *now == second && itemCount() > 1 && std::find(line, at, ':') == at;
     return fail(line, "a time later than " + formatDate(dateOfSecond(second)),
-                formatDate(dateOfSecond(*now)) + hintOfTwoColumns(after));
+                formatDate(dateOfSecond(*now)) + hintOfTwoColumns(after) + (mayBeHour ? hintOfHour(after) : ""));
   }
   if (times_.empty()) startSecond_ = *now;
   second = *now;
@@ -177,6 +202,17 @@ bool CsvTimeSeries::readRow(const char* line, const char* lineEnd, csv::DateScan
   times_.push_back(static_cast<double>(second - startSecond_) / 86400.0);
   cells_.push_back(static_cast<std::size_t>(at + 1 - content_.data()));
   return true;
+}
+
+std::string CsvTimeSeries::doubt() const {
+  if (itemCount() < 2 || !isHeadingOfHours(itemName(1))) return {};
+  constexpr std::int64_t kDaySeconds = 86400;
+  const bool hasDatesOnly =
+      startSecond_ % kDaySeconds == 0 &&
+      std::all_of(times_.begin(), times_.end(), [](double days) { return days == std::floor(days); });
+  if (!hasDatesOnly) return {};
+  return fmt::format("{}: column 2 is called {} and is read as item No. 1, not as a part of the time; {}", sourceName_,
+                     quotedForMessage(itemName(1)), kOneColumn);
 }
 
 void CsvTimeSeries::moveToItem(int item) {

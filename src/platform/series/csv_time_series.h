@@ -27,6 +27,8 @@ class CsvTimeSeries final : public StoredTimeSeries {
   /// The value of the `# missing =` comment, else NaN. Empty cells, NaN and NA become NaN.
   std::optional<float> deleteValue() const override { return deleteValue_; }
   bool endsLine() const override { return mirevo::endsLine(content_); }
+  /// A time of day in a column of its own, which would be the first item.
+  std::string doubt() const override;
 
  private:
   bool readItem(std::size_t place) override;

@@ -42,13 +42,50 @@ const KdxSection* sectionAt(const KdxSection& target, std::string_view path) {
   return node;
 }
 
-/// A section as it is to be added, with the keywords that have no default.
-std::string linesOfSection(std::string_view parent, std::string_view name, const SectionRow& row) {
-  std::string lines = fmt::format("\n   in [{}]:\n   [{}]", parent.empty() ? kSetupTarget : parent, name);
-  for (const KeywordRow& keyword : row.keywords) {
-    if (keyword.isRequired()) lines += fmt::format("\n     {} = ...", keyword.name());
+/// The sections inside the one with the pattern `path` that the schema does not know.
+std::vector<std::string> unknownSections(const KdxSection& node, std::string_view path, const SetupSchema& schema) {
+  std::vector<std::string> unknown;
+  for (const auto& section : node.sections()) {
+    if (schema.findSection(inside(path, itemPattern(section->name()))) == nullptr) unknown.push_back(section->name());
   }
-  return lines + fmt::format("\n   [/{}]", name);
+  return unknown;
+}
+
+/// The name that the section with this path has in the setup, if it and those around it may be misspelt; empty if it is
+/// not there.
+std::optional<std::string> nameInSetup(const KdxSection& target, std::string_view path, const SetupSchema& schema) {
+  const KdxSection* node = &target;
+  std::string pattern;
+  for (const std::string_view name : splitAt(path, '/')) {
+    const KdxSection* inner = node->section(name);
+    if (inner == nullptr) {
+      const auto nearest = nearestName(name, unknownSections(*node, pattern, schema));
+      if (!nearest) return std::nullopt;
+      inner = node->section(*nearest);
+    }
+    node = inner;
+    pattern = inside(pattern, itemPattern(name));
+  }
+  return node->name();
+}
+
+/// A section as it is to be added, with the keywords that have no default and the first item of a list that needs one.
+std::string linesOfSection(std::string_view name, const SectionRow& row, const SetupSchema& schema,
+                           const std::string& indent) {
+  std::string lines = fmt::format("\n{}[{}]", indent, name);
+  bool needsItem = false;
+  for (const KeywordRow& keyword : row.keywords) {
+    if (!keyword.isRequired()) continue;
+    lines += fmt::format("\n{}  {} = ...", indent, keyword.name());
+    needsItem = needsItem || keyword.name() == kItemCountKeyword;
+  }
+  for (const std::string& item : schema.sectionNamesInside(needsItem ? row.path : "")) {
+    if (needsItem && item.ends_with("_n")) {
+      lines += linesOfSection(item.substr(0, item.size() - 1) + "1", *schema.findSection(inside(row.path, item)),
+                              schema, indent + "  ");
+    }
+  }
+  return lines + fmt::format("\n{}[/{}]", indent, name);
 }
 
 /// The item sections whose number is above `count`, in file order; one whose number is too large to be read counts,
@@ -122,21 +159,32 @@ std::string SetupFile::linesToAdd(std::string_view parent, std::string_view open
   const KdxSection* target = document_.root.section(kSetupTarget);
   if (target == nullptr) return {};
   std::string lines;
+  std::string misspelt;
   int count = 0;
   const auto add = [&](std::string_view inWhich, std::string_view name) {
     const SectionRow* row = schema_.findSection(patternOf(inside(inWhich, name)));
-    if (row != nullptr && ++count <= kMostSections) lines += linesOfSection(inWhich, name, *row);
+    if (row == nullptr || ++count > kMostSections) return;
+    lines += fmt::format("\n   in [{}]:", inWhich.empty() ? kSetupTarget : inWhich) +
+             linesOfSection(name, *row, schema_, "   ");
   };
   if (isOpenedListed) add(parent, opened);
   const std::string missing = inside(parent, opened);
   for (const std::string_view path : needed_) {
-    if (path == missing || sectionAt(*target, path) != nullptr) continue;
+    if (path == missing) continue;
     const std::size_t slash = path.rfind('/');
-    const bool isTop = slash == std::string_view::npos;
-    add(isTop ? std::string_view{} : path.substr(0, slash), isTop ? path : path.substr(slash + 1));
+    const std::string_view inWhich = path.substr(0, slash == std::string_view::npos ? 0 : slash);
+    const std::string_view name = path.substr(slash == std::string_view::npos ? 0 : slash + 1);
+    const auto found = nameInSetup(*target, path, schema_);
+    if (!found) {
+      add(inWhich, name);
+    } else if (*found != name) {
+      misspelt +=
+          fmt::format("\nmisspelt, too, in [{}]: found {}, did you mean {}?", inWhich.empty() ? kSetupTarget : inWhich,
+                      quotedForMessage(*found), quotedForMessage(name));
+    }
   }
   if (count > kMostSections) lines += fmt::format("\n   and {} more", count - kMostSections);
-  return lines.empty() ? lines : "\nsections to add:" + lines;
+  return (lines.empty() ? lines : "\nsections to add:" + lines) + misspelt;
 }
 
 std::string SetupFile::location(KdxPosition position) const {
@@ -195,12 +243,7 @@ SetupSection SetupSection::open(std::string_view name) const {
 }
 
 void SetupSection::failMissing(std::string_view name, std::string_view addition) const {
-  std::vector<std::string> unknown;
-  for (const auto& section : node_->sections()) {
-    const std::string path = inside(pattern_, itemPattern(section->name()));
-    if (file_->schema().findSection(path) == nullptr) unknown.push_back(section->name());
-  }
-  const std::string meant = didYouMean(name, unknown);
+  const std::string meant = didYouMean(name, unknownSections(*node_, pattern_, file_->schema()));
   const std::string where = node_->name().empty() ? std::string("in the file") : "in section " + node_->name();
   fatalError(fmt::format("Error: Unable to open section {} in KDX file", name),
              fmt::format("{}: expected section [{}] {}{}{}", file_->location(node_->position()), name, where, meant,
@@ -255,7 +298,7 @@ void SetupSection::takeRow(const KeywordRow& row, void* settings) const {
   }
   if (count > 0) return;
   if (row.isRequired()) refuseMissing(row);
-  refuseMisspelt(row);
+  refuseMisspelt(row, row.isLeftOutByDefault() ? "none" : row.facts.defaultValue);
   if (isList || row.isLeftOutByDefault()) return;
   takeValue(row, defaultSetupValue(row), true, settings);
 }
@@ -309,7 +352,7 @@ std::size_t SetupSection::readCount(std::string_view itemPrefix) const {
   const KdxKeyword* keyword = node_->keyword(row.name());
   if (keyword == nullptr) {
     if (present > 0) refuseMissing(row);  // else the items would be ignored silently
-    refuseMisspelt(row);
+    refuseMisspelt(row, "0");
     echo(row, SetupValue(std::int32_t{0}), true);
     return 0;
   }
@@ -376,13 +419,12 @@ std::vector<std::string> SetupSection::unknownKeywords() const {
   return unknown;
 }
 
-void SetupSection::refuseMisspelt(const KeywordRow& row) const {
+void SetupSection::refuseMisspelt(const KeywordRow& row, std::string_view meantByNone) const {
   for (const std::string& name : unknownKeywords()) {
     if (editDistance(name, row.name()) > 1) continue;
     refuseToRead(node_->keyword(name)->position, row.name(),
-                 fmt::format("the keyword is missing, which would mean {}; found {}, did you mean {}?",
-                             row.isLeftOutByDefault() ? "none" : row.facts.defaultValue, quotedForMessage(name),
-                             quotedForMessage(row.name())));
+                 fmt::format("the keyword is missing, which would mean {}; found {}, did you mean {}?", meantByNone,
+                             quotedForMessage(name), quotedForMessage(row.name())));
   }
 }
 

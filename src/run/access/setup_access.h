@@ -49,7 +49,8 @@ class SetupFile final {
   /// The run needs the sections with these paths, too, and not only those that are always read.
   void need(const std::vector<std::string>& paths);
   /// The needed sections that the setup lacks, the first of them, as lines to add to it: those of `opened`, a section
-  /// that is missing in `parent`, come first. `isOpenedListed`: false if it is there under another name.
+  /// that is missing in `parent`, come first. `isOpenedListed`: false if it is there under another name. Others that
+  /// seem to be there under another name are named as misspelt.
   std::string linesToAdd(std::string_view parent, std::string_view opened, bool isOpenedListed) const;
 
   /// Every setting that affects the results, in reading order.
@@ -161,7 +162,7 @@ class SetupSection final {
   /// The unknown keywords of the section.
   std::vector<std::string> unknownKeywords() const;
   /// Refuses a keyword that is absent, and would have its default, if an unknown one differs from it by one edit.
-  void refuseMisspelt(const KeywordRow& row) const;
+  void refuseMisspelt(const KeywordRow& row, std::string_view meantByNone) const;
   [[noreturn]] void refuseMissing(const KeywordRow& row) const;
   [[noreturn]] void refuseToRead(KdxPosition position, std::string_view keyword, std::string_view explanation) const;
   void echo(const KeywordRow& row, const SetupValue& value, bool isDefault) const;

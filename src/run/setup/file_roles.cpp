@@ -35,6 +35,7 @@ bool isNamedLike(std::string_view rest, const RunFile& file) {
 }
 
 /// The file or folder of runs, one of `files` named after `prefix`, that is `path` or has it inside; both are resolved.
+/// What a model may call alike is one by its content alone.
 std::optional<std::string> runsOwn(const std::string& path, const std::string& prefix, std::span<const RunFile> files) {
   const std::size_t slash = prefix.rfind('/');
   const auto below = pathInFolder(path, prefix.substr(0, slash));
@@ -42,7 +43,9 @@ std::optional<std::string> runsOwn(const std::string& path, const std::string& p
   std::string_view rest = below->substr(0, below->find('/'));
   const std::string name(rest);
   if (!takeText(rest, std::string_view(prefix).substr(slash + 1))) return std::nullopt;
-  const bool isOwn = std::any_of(files.begin(), files.end(), [rest](const RunFile& f) { return isNamedLike(rest, f); });
+  const bool isOwn = std::any_of(files.begin(), files.end(), [&](const RunFile& file) {
+    return isNamedLike(rest, file) && (!file.mayBeModels || carriesMark(path, file));
+  });
   return isOwn ? std::optional(prefix.substr(0, slash + 1) + name) : std::nullopt;
 }
 
@@ -101,11 +104,7 @@ void warnOfObservations(const RunConfig& config, const SectionsRead& sections) {
   for (std::size_t i = 0; i < config.measures.size(); ++i) {
     const OutputMeasure& measure = config.measures[i];
     if (measure.interfaceType != InterfaceType::timeSeries) continue;
-    std::vector<RunFile> files;
-    for (const RunFile& file : runFilesOfSetup()) {
-      if (!file.mayBeModels || carriesMark(measure.observation.fileName, file)) files.push_back(file);
-    }
-    const auto own = runsOwn(measure.observation.fileName, config, files);
+    const auto own = runsOwn(measure.observation.fileName, config, runFilesOfSetup());
     if (!own) continue;
     sections.measures[i].warn(
         "Name",

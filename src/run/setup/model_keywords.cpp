@@ -1,6 +1,7 @@
 #include "run/setup/model_keywords.h"
 
 #include <map>
+#include <tuple>
 
 #include <fmt/format.h>
 
@@ -27,20 +28,20 @@ SettingSection<SeriesReference> seriesSection(std::string_view path, std::string
 const SectionRow& listSection(std::string_view path) {
   static const std::map<std::string_view, SectionRow> rows = [] {
     std::map<std::string_view, SectionRow> lists;
-    for (const auto& [list, meaning] : {
-             std::pair{"MIREVO_SIMULATION_OPTION/SIMBATCH",
-                       "What one model run starts, one item after another. At least one item."},
-             std::pair{"MIREVO_SIMULATION_OPTION/SIMPARAM",
-                       "The model's own input files into which parameter values are written. At least one item."},
-             std::pair{"MODEL_PARAMETERS", "The parameters of the model. At least one, and at least one variable."},
-             std::pair{"MODEL_PARAMETERS/INTERNAL_CONSTRAINTS",
-                       "Comparisons that every parameter set must satisfy; one that does not is not run."},
-             std::pair{"ObjectiveFunctions/OUTPUT_MEASURES", "The output measures. At least one."},
-             std::pair{"ObjectiveFunctions/OBJECTIVE_FUNCTIONS", "The objective functions. At least one."},
-             std::pair{"SAVE_OUTPUT_FILES",
-                       "Model output files that are kept for each evaluation. A count of 0 keeps none."},
+    for (const auto& [list, least, meaning] : {
+             std::tuple{"MIREVO_SIMULATION_OPTION/SIMBATCH", 1,
+                        "What one model run starts, one item after another. At least one item."},
+             std::tuple{"MIREVO_SIMULATION_OPTION/SIMPARAM", 1,
+                        "The model's own input files into which parameter values are written. At least one item."},
+             std::tuple{"MODEL_PARAMETERS", 1, "The parameters of the model. At least one, and at least one variable."},
+             std::tuple{"MODEL_PARAMETERS/INTERNAL_CONSTRAINTS", 0,
+                        "Comparisons that every parameter set must satisfy; one that does not is not run."},
+             std::tuple{"ObjectiveFunctions/OUTPUT_MEASURES", 1, "The output measures. At least one."},
+             std::tuple{"ObjectiveFunctions/OBJECTIVE_FUNCTIONS", 1, "The objective functions. At least one."},
+             std::tuple{"SAVE_OUTPUT_FILES", 0,
+                        "Model output files that are kept for each evaluation. A count of 0 keeps none."},
          }) {
-      lists.emplace(list, SectionRow{list, "always", meaning, {itemCount()}});
+      lists.emplace(list, SectionRow{list, "always", meaning, {itemCount(least)}});
     }
     return lists;
   }();

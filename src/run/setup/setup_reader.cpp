@@ -31,16 +31,19 @@ namespace {
 constexpr std::array<std::string_view, 14> kModelSetupEndings = {
     ".bat", ".cmd", ".sh", ".exe", ".sim", ".mod", ".run", ".inp", ".ini", ".cfg", ".ctl", ".par", ".set", ".dat"};
 
-/// The sections of the measures that compare time series, for those measures that are there.
+/// The sections of the measures that compare time series: of those that are there, or of the first one to be added.
 std::vector<std::string> seriesSections(const SetupSection& target) {
   std::vector<std::string> paths;
   constexpr std::string_view kList = "ObjectiveFunctions/OUTPUT_MEASURES";
+  const auto add = [&paths](const std::string& measure) {
+    paths.insert(paths.end(), {measure + "/SIMULATION_FILE", measure + "/OBSERVATION_FILE"});
+  };
+  if (!target.holds(kList)) add(fmt::format("{}/MEASURE_1", kList));
   const auto count = target.peek(kList, kItemCountKeyword);
   for (int number = 1; count && number <= std::get<std::int32_t>(*count); ++number) {
     const std::string measure = fmt::format("{}/MEASURE_{}", kList, number);
     if (!target.holds(measure)) break;
-    if (target.peek(measure, "Interface_Type") != SetupValue(std::int32_t{0})) continue;
-    paths.insert(paths.end(), {measure + "/SIMULATION_FILE", measure + "/OBSERVATION_FILE"});
+    if (target.peek(measure, "Interface_Type") == SetupValue(std::int32_t{0})) add(measure);
   }
   return paths;
 }

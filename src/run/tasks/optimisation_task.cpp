@@ -19,6 +19,15 @@ namespace {
 constexpr std::string_view kAlgorithmKeyword = "Algorithm_Type";
 constexpr std::string_view kSurrogateKeyword = "Use_Surrogate_Model";
 
+/// Gives every set the value of a failed run.
+class NoModel final : public Evaluator {
+ public:
+  std::vector<EvaluationResult> evaluateParameterSets(std::span<const ParameterSet> sets,
+                                                      DispatchMode /*mode*/) override {
+    return std::vector<EvaluationResult>(sets.size());
+  }
+};
+
 const SettingSection<OptimisationTask>& optimisationSection() {
   static const SettingSection<OptimisationTask> section{
       {"OPTIMISATION_ALGORITHM",
@@ -159,7 +168,7 @@ void OptimisationTask::takeGivenValues(const TaskReading& reading, const SetupSe
   try {
     sample = loadInitialSample(initialSample.fileName, BuildSearchSpace(reading.parameters));
   } catch (const FatalError&) {
-    return;  // refused later: bounds with the other parameters, the file when the search begins
+    return;  // refused later: bounds with the other parameters, the file by requireSets()
   }
   std::size_t variable = 0;
   for (const ModelParameter& parameter : reading.parameters) {
@@ -287,14 +296,30 @@ void OptimisationTask::warnOfGivenSets(const TaskContext& context, const SearchP
   warnOfInfeasibleSets(context, given, "given sets of the initial sample", stopping.maxEvaluations);
 }
 
-SearchSummary OptimisationTask::search(const TaskContext& context) const {
-  UniformGenerator random(randomSeed);
-  SearchProblem problem{searchBounds(context.space), stopping, initialSample, {}, context.evaluator, random};
+SearchProblem OptimisationTask::problemOf(const SearchSpace& space, const Feasibility& feasibility,
+                                          Evaluator& evaluator, UniformGenerator& random) const {
+  SearchProblem problem{searchBounds(space), stopping, initialSample, {}, evaluator, random};
   problem.earlierSearches = earlierSearches_;
   if (method->facts().drawsInitialSample && initialSample.generation == SampleGeneration::fromFile) {
-    problem.givenSample = loadInitialSample(initialSample.fileName, context.space).sets;
+    problem.givenSample = loadInitialSample(initialSample.fileName, space).sets;
   }
-  problem.feasibility = context.feasibility;
+  problem.feasibility = feasibility;
+  return problem;
+}
+
+/// Begins the same search with a generator of its own and without a model.
+void OptimisationTask::requireSets(const SearchSpace& space, const Feasibility& feasibility) const {
+  const bool drawsAnySet = !feasibility.isTested() && initialSample.generation != SampleGeneration::fromFile;
+  const bool isSearch = surrogateUse == SurrogateUse::no || surrogateUse == SurrogateUse::yes;
+  if (drawsAnySet || !isSearch || !earlierSearches_.empty()) return;  // a search that is continued had begun
+  UniformGenerator random(randomSeed);
+  NoModel evaluator;
+  method->make(problemOf(space, feasibility, evaluator, random))->initialise();
+}
+
+SearchSummary OptimisationTask::search(const TaskContext& context) const {
+  UniformGenerator random(randomSeed);
+  SearchProblem problem = problemOf(context.space, context.feasibility, context.evaluator, random);
   warnOfGivenSets(context, problem);
   std::optional<ProposalSelector> selector;
   if (usesSurrogate()) problem.selector = &selector.emplace(surrogate, problem.bounds, problem.feasibility);

@@ -26,6 +26,7 @@ class OptimisationTask final : public Task {
   bool hasFinalRun() const override { return true; }
   bool drawsRandomNumbers() const override { return true; }
   std::optional<OneSlotOnly> needsOneSlot() const override;
+  void requireSets(const SearchSpace& space, const Feasibility& feasibility) const override;
   TaskOutcome run(const TaskContext& context) override;
   TaskReport report() const override;
   std::optional<RaisedBudget> raisedBudget(const SearchHistory& history) const override;
@@ -47,6 +48,8 @@ class OptimisationTask final : public Task {
   void warnOfOneLoop(const SetupSection& section) const;
   void readSurrogate(const TaskReading& reading, const SetupSection& section, const SetupSection& stoppingSection);
   void warnOfGivenSets(const TaskContext& context, const SearchProblem& problem) const;
+  SearchProblem problemOf(const SearchSpace& space, const Feasibility& feasibility, Evaluator& evaluator,
+                          UniformGenerator& random) const;
   SearchSummary search(const TaskContext& context) const;
 
   std::vector<std::vector<double>> givenValues_;  ///< those of a sample file, one entry per model parameter

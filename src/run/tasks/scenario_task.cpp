@@ -29,7 +29,7 @@ const SectionRow& listSection() {
   static const SectionRow section{"SCENARIOS/SCENARIO_RUNS",
                                   "when `Scenario_Type` is 1",
                                   "The parameter sets of the runs. At least one.",
-                                  {itemCount()}};
+                                  {itemCount(1)}};
   return section;
 }
 

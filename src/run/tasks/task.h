@@ -141,6 +141,10 @@ class Task {
   /// Empty if its batches fill several slots.
   virtual std::optional<OneSlotOnly> needsOneSlot() const { return std::nullopt; }
 
+  /// Throws FatalError if run() would before its first model run, as there is no parameter set that can be run. Takes
+  /// nothing from the random numbers of run().
+  virtual void requireSets(const SearchSpace& /*space*/, const Feasibility& /*feasibility*/) const {}
+
   /// Runs it. Throws FatalError and RunCancelled.
   virtual TaskOutcome run(const TaskContext& context) = 0;
 

@@ -106,6 +106,11 @@ std::vector<std::string> UncertaintyTask::warnings(const SearchSpace& space) con
   return distributionWarnings(settings, space);
 }
 
+void UncertaintyTask::requireSets(const SearchSpace& /*space*/, const Feasibility& feasibility) const {
+  if (!settings.redrawsInfeasible || !feasibility.isTested() || settings.parameters.empty()) return;
+  feasibleUncertaintySample(settings, randomSeed, feasibility, [](std::string_view) {});
+}
+
 /// `acceptance`: a line on the sets drawn, if any can be drawn again.
 std::vector<ParameterSet> UncertaintyTask::drawSample(const TaskContext& context, std::string& acceptance) const {
   if (settings.parameters.empty()) return {};

@@ -48,6 +48,7 @@ TEST(CsvTimeSeries, RefusesWithThePlaceAndWhatWasExpected) {
   const std::string noHeader =
       ":1: expected a header row (the time column's name, then one name an item), found the end of the file";
   const std::string noTime = "4:1: expected a valid time like 2001-01-31 12:30, found ";
+  const std::string twice = "4:1: expected a time later than 2001-01-31 00:00, found 2001-01-31 00:00";
   const std::tuple<std::string, std::string> cases[] = {
       {"", "1" + noHeader},
       {"# only\n", "2" + noHeader},
@@ -61,7 +62,11 @@ TEST(CsvTimeSeries, RefusesWithThePlaceAndWhatWasExpected) {
       {"2001-01-31,1\n", "1:1: expected a header row before the first time step, found \"2001-01-31,1\""},
       {"# missing = \ntime,Q\n", "1:12: expected a number after \"# missing =\", found \"\""},
       {"# missing = none\ntime,Q\n", "1:13: expected a number after \"# missing =\", found \"none\""},
-      {head + "2001-01-31,1,2\n", "4:1: expected a time later than 2001-01-31 00:00, found 2001-01-31 00:00"},
+      {head + "2001-01-31 00:00,1,2\n", twice},
+      {head + "2001-01-31,25,2\n", twice},
+      {"time,Q\n\n2001-01-31,0\n2001-01-31,1\n", twice},
+      {head + "2001-01-31,24,2\n",
+       twice + "; if 24 is the hour: the date and the time of day must be in one column, such as 2001-01-31 12:30"},
       {"d,h,Q\n2001-01-31,0:00,1\n2001-01-31,1:00,2\n",
        "3:1: expected a time later than 2001-01-31 00:00, found 2001-01-31 00:00; the date and the time of day must be "
        "in one column, such as 2001-01-31 12:30"},
@@ -136,6 +141,20 @@ TEST(CsvTimeSeries, CellsThatAreNoNumbersAreRefused) {
     CsvTimeSeries series;
     ASSERT_TRUE(series.parse("s.csv", "time,Q\n2001-01-01," + std::string(cell) + "\n"));
     EXPECT_THAT(valuesOf(series, 1), ElementsAre(0.0F)) << cell;
+  }
+}
+
+TEST(CsvTimeSeries, AFirstItemThatIsCalledLikeATimeOfDayIsDoubted) {
+  CsvTimeSeries series;
+  for (const char* heading : {"hour", " HOUR ", "Time (UTC)", "\"HH:MM\"", "time_of_day"}) {
+    ASSERT_TRUE(series.parse("s.csv", fmt::format("date,{},Q\n2001-01-01,12,1\n2001-01-02,12,1\n", heading)));
+    EXPECT_THAT(series.doubt(), HasSubstr(" and is read as item No. 1, not as a part of the time; ")) << heading;
+  }
+  for (const char* content :
+       {"date,hourly,Q\n2001-01-01,12,1\n", "date,hour\n2001-01-01,12\n", "date,Q,hour\n2001-01-01,1,12\n",
+        "date,hour,Q\n2001-01-01 06:00,12,1\n", "date,hour,Q\n2001-01-01,12,1\n2001-01-01 06:00,12,1\n"}) {
+    ASSERT_TRUE(series.parse("s.csv", content));
+    EXPECT_EQ(series.doubt(), "") << content;
   }
 }
 

@@ -90,6 +90,13 @@ TEST_F(SetupReaderTest, RefusesWhatCannotBeReadAndSaysWhere) {
        " section SimultaneousSimulations in KDX file\nsetup.kdx:1:1: expected section [SimultaneousSimulations] in "
        "section MIREVO_PARAMETERS\nsections to add:\n   in [MIREVO_PARAMETERS]:\n   [SimultaneousSimulations]\n   "
        "[/SimultaneousSimulations]"},
+      {"[SIMBATCH] => [B] & [/SIMBATCH] => [/B] & [SIMPARAM] => [SIMPARAMS] & [/SIMPARAM] => [/SIMPARAMS] & "
+       "[MODEL_PARAMETERS] => [Model_Parameters] & [/MODEL_PARAMETERS] => [/Model_Parameters]",
+       " section SIMBATCH in KDX file\nsetup.kdx:2:3: expected section [SIMBATCH] in section MIREVO_SIMULATION_OPTION\n"
+       "sections to add:\n   in [MIREVO_SIMULATION_OPTION]:\n   [SIMBATCH]\n     TqSEKdxListItemCount = ...\n     "
+       "[SIMBATCHITEM_1]\n       BatchFileName = ...\n     [/SIMBATCHITEM_1]\n   [/SIMBATCH]\n"
+       "misspelt, too, in [MIREVO_SIMULATION_OPTION]: found \"SIMPARAMS\", did you mean \"SIMPARAM\"?\n"
+       "misspelt, too, in [MIREVO_PARAMETERS]: found \"Model_Parameters\", did you mean \"MODEL_PARAMETERS\"?"},
       {"[SAVE_OUTPUT_FILES] => [Saved] & [/SAVE_OUTPUT_FILES] => [/Saved] & [STOPPING_CRITERIA] => [Stops] & "
        "[/STOPPING_CRITERIA] => [/Stops]",
        " section SAVE_OUTPUT_FILES in KDX file\nsetup.kdx:1:1: expected section [SAVE_OUTPUT_FILES] in section "
