@@ -128,6 +128,11 @@ std::string meaningOfCode(int status, const std::string& file) {
 PosixProcessLauncher::~PosixProcessLauncher() {
   haltProcesses();
   closeDescriptors();
+  for (const Slot& slot : slots_) {
+    // A model has put it in the place of its folder; the next run would refuse it as the user's.
+    std::error_code ignored;
+    if (std::filesystem::is_symlink(slot.folder, ignored)) std::filesystem::remove(slot.folder, ignored);
+  }
 }
 
 void PosixProcessLauncher::closeDescriptors() {

@@ -40,8 +40,8 @@ void ResultFile::open(const std::string& path, std::span<const std::string> head
   std::string content = commentLines(headLines) + resultHeader(columns) + '\n';
   headLength_ = std::ssize(content);
   if (earlierRows.empty()) {
+    checksums_.open({});  // first: without a head the closing lines would make the table none of a run's
     file_.open(path);
-    checksums_.open({});
     file_.append(content);
     return;
   }

@@ -130,17 +130,17 @@ TEST_F(ResultFileTest, RowsStayWhereTheyAreWhenTheyCannotBePutInOrder) {
   EXPECT_TRUE(folder_.read("r.dat").ends_with("2\tOK\t2\t2\t2\t2\n1\tOK\t1\t1\t1\t1\n# done\n"));
 }
 
-TEST_F(ResultFileTest, AFullDiskIsReportedOnceWithItsReason) {
+TEST_F(ResultFileTest, ARowWithoutRoomForItsChecksumIsNotWritten) {
+  open();
   ::signal(SIGXFSZ, SIG_IGN);
   rlimit limit{};
   ASSERT_EQ(::getrlimit(RLIMIT_FSIZE, &limit), 0);
-  const rlimit little{kHeadText.size() - 1, limit.rlim_max};  // the checksums, which are opened first, fit in
-  ASSERT_EQ(::setrlimit(RLIMIT_FSIZE, &little), 0);
-  const std::string refusal = refusalOf([this] { open(); });
+  const rlimit none{0, limit.rlim_max};
+  ASSERT_EQ(::setrlimit(RLIMIT_FSIZE, &none), 0);
+  const std::string refusal = refusalOf([this] { add(success(1, 1, 1), 1); });
   ::setrlimit(RLIMIT_FSIZE, &limit);
-  EXPECT_EQ(refusal, "Error: Unable to write to " + path_ + "\nFile too large");
-  add(success(1, 1, 1), 1);
-  EXPECT_FALSE(results_.finish({}, reason_));
+  EXPECT_EQ(refusal, "Error: Unable to write to " + (folder_ / "r_Checksums.dat") + "\nFile too large");
+  EXPECT_FALSE(folder_.read("r.dat").ends_with("1\tOK\t1\t1\t1\t1\n"));
 }
 
 TEST(KeepEarlierFile, NumbersWithoutOverwriting) {
