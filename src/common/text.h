@@ -59,6 +59,10 @@ std::vector<std::string_view> splitAt(std::string_view text, char separator,
 
 /// The lines of `text`, without their line ends (LF or CRLF); a last line without an end counts.
 std::vector<std::string_view> splitLines(std::string_view text);
+/// Whether the last line has an end (LF, CRLF, or its CR alone), as far as there is one.
+inline bool endsLine(std::string_view text) {
+  return text.empty() || text.back() == '\n' || text.back() == '\r';
+}
 
 /// `text` with every control character, including line ends, replaced by a blank.
 std::string onOneLine(std::string_view text);

@@ -22,7 +22,7 @@ void EvaluationLedger::begin(std::span<const ParameterSet> sets, DispatchMode mo
 }
 
 void EvaluationLedger::replay(std::size_t place, EvaluationResult result) {
-  PairsFound found = pairComparison_.take(result);
+  ComparisonFindings found = runComparison_.take(result);
   observer_.evaluationReplayed(sets_[place], result);
   tell(std::move(found));
   store(place, std::move(result));
@@ -41,7 +41,7 @@ void EvaluationLedger::store(std::size_t place, EvaluationResult result) {
 std::optional<std::size_t> EvaluationLedger::takeNext() {
   while (next_ < sets_.size() && isFinished_[next_]) ++next_;
   if (next_ == sets_.size() && returned_.empty()) return std::nullopt;
-  if (openCount_ > 0 && pairComparison_.isAwaited()) return std::nullopt;
+  if (openCount_ > 0 && runComparison_.isAwaited()) return std::nullopt;
   ++openCount_;
   if (returned_.empty()) return next_++;
   const std::size_t first = *returned_.begin();
@@ -75,9 +75,9 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
   }
   std::optional<EvaluationResult> known;  // a repeated run has its row already, which is kept
   if (earlier_ != nullptr) known = earlier_->take(result.number, sets_[place]);
-  PairsFound found;
+  ComparisonFindings found;
   if (!known) {
-    found = pairComparison_.take(result);
+    found = runComparison_.take(result);
     observer_.recordEvaluation(sets_[place], result);
   }
   observer_.message(progress::completedMessage(result.number, outcome));
@@ -91,10 +91,13 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
   store(place, std::move(result));
 }
 
-void EvaluationLedger::tell(PairsFound found) {
+void EvaluationLedger::tell(ComparisonFindings found) {
   if (found.isEmpty()) return;
-  for (FewerPairs& fewer : found.fewer) fewer.isWarnedOf = warnedOf_.contains({fewer.number, fewer.measure});
-  observer_.pairsFound(found);
+  for (RunDifference& difference : found.differences) {
+    difference.isTold = difference.kind == RunDifference::Kind::fewerPairs &&
+                        warnedOf_.contains({difference.number, difference.measure});
+  }
+  observer_.runCompared(found);
 }
 
 void EvaluationLedger::warnOfUnusedObservations(const EvaluationResult& result) {

@@ -16,7 +16,7 @@
 #include "evaluation/evaluation_result.h"
 #include "evaluation/evaluator.h"
 #include "evaluation/failed_run_policy.h"
-#include "evaluation/pair_comparison.h"
+#include "evaluation/run_comparison.h"
 #include "measures/objective_functions.h"
 
 namespace mirevo {
@@ -27,12 +27,12 @@ class EvaluationLedger final {
  public:
   /// `earlier`: evaluations that are not repeated; may be null.
   EvaluationLedger(EvaluationObserver& observer, FailedRunPolicy& failedRuns, EarlierEvaluations* earlier = nullptr,
-                   EqualMeasures equalMeasures = {}, PairComparison pairComparison = {})
+                   EqualMeasures equalMeasures = {}, RunComparison runComparison = {})
       : observer_(observer),
         failedRuns_(failedRuns),
         earlier_(earlier),
         equalMeasures_(std::move(equalMeasures)),
-        pairComparison_(std::move(pairComparison)) {}
+        runComparison_(std::move(runComparison)) {}
 
   /// Opens the next batch of the run; `place` below is the 0-based index of a set in it.
   /// Sets that an earlier run has evaluated get their results at once, unless `mode` requires their model runs. Throws
@@ -46,10 +46,15 @@ class EvaluationLedger final {
   const ParameterSet& set(std::size_t place) const { return sets_[place]; }
   /// The set's number in the run, from 1.
   int numberOf(std::size_t place) const { return evaluationCount_ + static_cast<int>(place) + 1; }
-  /// The pairs that the model run of the set taken last needs.
-  RequiredPairs requiredPairs() const { return pairComparison_.required(); }
+  /// By what the model run of the set taken last is judged.
+  RunStandard standard() const { return runComparison_.standard(); }
   /// To be called when the model run of the set has started.
   void markInitiated(std::size_t place);
+  /// Whether the result of a set can be taken; if not, the first successful run must end first, whose set has been
+  /// taken before. Makes it a failed one if it is cut off. To be called before finish().
+  bool judge(std::size_t place, EvaluationResult& result) const {
+    return runComparison_.judge(numberOf(place), result);
+  }
   /// Takes the result of a set; its number is filled in here. `leftBehind`: what the launcher says of processes that
   /// had to be ended, or empty. Throws FatalError when the failed-run limit is exceeded.
   void finish(std::size_t place, EvaluationResult result, std::string_view leftBehind = {});
@@ -67,7 +72,7 @@ class EvaluationLedger final {
  private:
   /// Warns of each measure for which this run has values for fewer observations than any run before.
   void warnOfUnusedObservations(const EvaluationResult& result);
-  void tell(PairsFound found);
+  void tell(ComparisonFindings found);
   void replay(std::size_t place, EvaluationResult result);
   void store(std::size_t place, EvaluationResult result);
   std::vector<EvaluationResult> close();
@@ -76,7 +81,7 @@ class EvaluationLedger final {
   FailedRunPolicy& failedRuns_;
   EarlierEvaluations* earlier_;
   EqualMeasures equalMeasures_;
-  PairComparison pairComparison_;
+  RunComparison runComparison_;
   bool isFinalRun_ = false;
   std::vector<ParameterSet> sets_;  ///< the ledger's own: an unfinished batch outlives its caller
   std::vector<EvaluationResult> results_;

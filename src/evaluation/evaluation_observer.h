@@ -5,7 +5,7 @@
 
 #include "common/parameter_set.h"
 #include "evaluation/evaluation_result.h"
-#include "evaluation/pair_comparison.h"
+#include "evaluation/run_comparison.h"
 
 namespace mirevo {
 
@@ -33,8 +33,9 @@ class EvaluationObserver {
   virtual void evaluationReplayed(std::span<const double> set, const EvaluationResult& result) {
     evaluationFinished(set, result);
   }
-  /// Something has become known of the pairs of evaluations that have been reported.
-  virtual void pairsFound(const PairsFound& found) { static_cast<void>(found); }
+  /// Something has become known of how evaluations that have been reported compare with the first successful
+  /// run.
+  virtual void runCompared(const ComparisonFindings& found) { static_cast<void>(found); }
   /// Whether the run was cancelled from outside. Once true it stays true.
   virtual bool isCancelled() = 0;
 };

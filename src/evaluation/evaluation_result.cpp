@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <array>
+#include <utility>
 
 namespace mirevo {
 namespace {
@@ -12,7 +13,7 @@ struct KindNames {
 };
 
 /// In the order of the kinds. The keys are used in files and never change; the names are for people.
-constexpr std::array<KindNames, 12> kKinds = {{
+constexpr std::array<KindNames, 13> kKinds = {{
     {"constraintsViolated", "parameter constraints violated"},
     {"equationNotFinite", "equation without a finite value"},
     {"valueNotWritable", "value that cannot be written in its field"},
@@ -23,6 +24,7 @@ constexpr std::array<KindNames, 12> kKinds = {{
     {"resultsNotWritten", "results not written"},
     {"resultsNotReadable", "results not readable"},
     {"resultNotFinite", "result not finite"},
+    {"resultsCutOff", "results cut off"},
     {"tooFewPairs", "too few pairs of simulated and observed values"},
     {"notKnown", "reason not known any more"},
 }};
@@ -42,6 +44,19 @@ std::optional<EvaluationFailure::Kind> failureKindOfKey(std::string_view key) {
       std::find_if(kKinds.begin(), kKinds.end(), [key](const KindNames& kind) { return kind.key == key; });
   if (found == kKinds.end()) return std::nullopt;
   return static_cast<EvaluationFailure::Kind>(found - kKinds.begin());
+}
+
+void EvaluationResult::fail(EvaluationFailure why) {
+  measureValues.assign(measureValues.size(), kFailedRunValue);
+  objectiveValues.assign(objectiveValues.size(), kFailedRunValue);
+  aggregate = kFailedRunValue;
+  exactMeasures.clear();
+  simulatedValues.clear();
+  shownSeries.clear();
+  unusedObservations.clear();
+  pairs.clear();
+  lastOutput.clear();
+  failure = std::move(why);
 }
 
 }  // namespace mirevo

@@ -7,6 +7,7 @@
 #include <string_view>
 #include <vector>
 
+#include "measures/file_form.h"
 #include "measures/period_series.h"
 
 namespace mirevo {
@@ -27,6 +28,7 @@ struct EvaluationFailure {
     resultsNotWritten,
     resultsNotReadable,
     resultNotFinite,
+    resultsCutOff,
     tooFewPairs,
     notKnown,  ///< failed in an earlier run, whose evidence is gone
   };
@@ -63,7 +65,8 @@ struct ValueSummary {
   bool operator==(const ValueSummary&) const = default;
 };
 
-/// The pairs of simulated and observed values by which a measure judges a model run; at least one.
+/// What a measure judges a model run by: the pairs of simulated and observed values, and the file that the run wrote.
+/// Of the measures that read the output-measure file only the first has it, and no pairs; the others have at least one.
 struct MeasurePairs {
   std::size_t measure = 0;  ///< 0-based
   std::size_t count = 0;
@@ -72,6 +75,7 @@ struct MeasurePairs {
   std::int64_t last = 0;
   ValueSummary observed;  ///< in the pairs
   ValueSummary simulated;
+  FileForm file;
 
   bool operator==(const MeasurePairs&) const = default;
   /// Whether these are pairs of the same observations, as far as their number, times and values tell.
@@ -98,13 +102,17 @@ struct EvaluationResult {
   std::vector<PeriodSeries> shownSeries;
   std::optional<EvaluationFailure> failure;
   std::vector<UnusedObservations> unusedObservations;
-  /// One per measure that compares series. Once the evaluation has been reported, and for one of an earlier run, only
-  /// those of the first successful run, of runs with other pairs, and of runs that ended before the first successful
-  /// one was known.
+  /// One per measure that compares series, and one if others read the output-measure file. Once the evaluation has been
+  /// reported, and for one of an earlier run, only those of the first successful run, of runs that differ from it, and
+  /// of runs that ended before the first successful one was known.
   std::vector<MeasurePairs> pairs;
+  /// Of a run that RunComparison::judge() may find to be cut off, the last lines that its batch printed.
+  std::vector<std::string> lastOutput;
   std::vector<std::string> warnings;  ///< warnings for the log, one line each
 
   bool ok() const { return !failure.has_value(); }
+  /// Makes a successful result a failed one.
+  void fail(EvaluationFailure why);
 };
 
 }  // namespace mirevo

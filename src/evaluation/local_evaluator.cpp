@@ -14,7 +14,7 @@ LocalEvaluator::LocalEvaluator(ModelRunner& runner, EvaluationObserver& observer
                                int slotCount, EarlierEvaluations* earlier)
     : runner_(runner),
       observer_(observer),
-      ledger_(observer, failedRuns, earlier, runner.equalMeasures(), runner.pairComparison()),
+      ledger_(observer, failedRuns, earlier, runner.equalMeasures(), runner.runComparison()),
       slots_(static_cast<std::size_t>(slotCount)) {
   assert(slotCount > 0);
 }
@@ -42,11 +42,11 @@ void LocalEvaluator::startNext(int slot) {
   while (const auto place = ledger_.takeNext()) {
     stopIfCancelled();
     if (!isUsable(slot)) return ledger_.putBack(*place);
-    runner_.requirePairs(ledger_.requiredPairs());
+    runner_.setStandard(ledger_.standard());
     auto failure = runner_.prepareModelRun(ledger_.set(*place), slot);
     if (!failure) {
       ledger_.markInitiated(*place);
-      slots_[static_cast<std::size_t>(slot - 1)].running = *place;
+      slots_[static_cast<std::size_t>(slot - 1)].running = Running{*place, {}};
       return;
     }
     ledger_.finish(*place, runner_.failedResult(std::move(*failure)));
@@ -70,15 +70,20 @@ bool LocalEvaluator::takeFinished() {
   for (int slot = 1; slot <= static_cast<int>(slots_.size()); ++slot) {
     auto& running = slots_[static_cast<std::size_t>(slot - 1)].running;
     if (!running) continue;
-    std::int32_t executing = 0;
-    std::int32_t status = 0;
-    runner_.launcher().isExecuting(slot, executing, status);
-    if (executing != 0) continue;
+    const std::size_t place = running->place;
+    if (!running->ended) {
+      std::int32_t executing = 0;
+      std::int32_t status = 0;
+      runner_.launcher().isExecuting(slot, executing, status);
+      if (executing != 0) continue;
+      running->ended = runner_.collect(slot);
+      runner_.keepOutputFiles(slot, ledger_.numberOf(place), *running->ended);
+    }
+    // The slot waits, too, as the folder of a failed run may be kept.
+    if (!ledger_.judge(place, *running->ended)) continue;
     any = true;
-    const std::size_t place = *running;
+    EvaluationResult result = std::move(*running->ended);
     running.reset();
-    EvaluationResult result = runner_.collect(slot);
-    runner_.keepOutputFiles(slot, ledger_.numberOf(place), result);
     if (ledger_.isFolderWanted(result)) runner_.keepFailedFolder(slot, ledger_.numberOf(place), result.warnings);
     ledger_.finish(place, std::move(result), runner_.launcher().leftBehind(slot));
     startNext(slot);

@@ -27,9 +27,14 @@ class LocalEvaluator final : public Evaluator {
   void settleAggregates(std::span<EvaluationResult> sample) override;
 
  private:
+  /// A model run in a slot.
+  struct Running {
+    std::size_t place = 0;                  ///< index in the batch of the set
+    std::optional<EvaluationResult> ended;  ///< waits for the first successful run, see EvaluationLedger::judge()
+  };
   struct Slot {
-    std::optional<std::size_t> running;  ///< index in the batch of the set that it runs
-    bool isGivenUp = false;              ///< its process folder cannot be used any more
+    std::optional<Running> running;
+    bool isGivenUp = false;  ///< its process folder cannot be used any more
   };
 
   void startInFreeSlots();

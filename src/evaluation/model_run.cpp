@@ -83,7 +83,8 @@ ValueSummary summaryOf(const Values& values) {
   return {*least, sum / static_cast<double>(values.size()), *largest};
 }
 
-MeasurePairs pairsOf(std::size_t measure, const MeasureStatistics& statistics, const TimeSeriesObject& simulation) {
+MeasurePairs pairsOf(std::size_t measure, const MeasureStatistics& statistics, const TimeSeriesObject& simulation,
+                     const FileForm& file) {
   const std::int64_t start = secondNumber(simulation.startTime().value());
   constexpr double kDaySeconds = 86400.0;
   const auto second = [start](double days) { return start + std::llround(days * kDaySeconds); };
@@ -94,7 +95,8 @@ MeasurePairs pairsOf(std::size_t measure, const MeasureStatistics& statistics, c
           second(statistics.times.front()),
           second(statistics.times.back()),
           summaryOf(statistics.observedValues),
-          summaryOf(statistics.simulatedValues)};
+          summaryOf(statistics.simulatedValues),
+          file};
 }
 
 void removeFile(const std::string& path) {
@@ -120,6 +122,10 @@ ModelRunner::ModelRunner(ModelDescription description, ParameterModel& parameter
   readTemplates();
   series_ = SeriesTables::MirevoTSobjectInit(description_.measures, description_.period);
   shownMeasures_ = measuresOfDistinctPairs(description_.measures);
+  for (const OutputMeasure& measure : description_.measures) {
+    if (measure.interfaceType != InterfaceType::measureFile) continue;
+    numbersNeeded_ = std::max(numbersNeeded_, static_cast<std::size_t>(measure.measurementNo));
+  }
   savedFiles_ = SavedFiles(description_.savedFiles, description_.baseFolder, description_.savedFolder);
   for (std::size_t i = 0; i < description_.measures.size() && description_.keepSimulatedValues; ++i) {
     const OutputMeasure& measure = description_.measures[i];
@@ -213,35 +219,29 @@ void ModelRunner::readTemplates() {
 
 EqualMeasures ModelRunner::equalMeasures() const {
   std::vector<std::string> written;
-  for (const ParameterFileItem& item : description_.parameterFiles) written.push_back(item.paramFileName);
+  for (const ParameterFileItem& item : description_.parameterFiles) {
+    written.push_back(item.paramFileName.substr(description_.baseFolder.size() + 1));
+  }
   std::vector<std::string> names;
   std::vector<std::string> read;
-  for (const OutputMeasure& measure : description_.measures) {
-    names.push_back(measure.name);
-    const bool isSeries = measure.interfaceType == InterfaceType::timeSeries;
-    read.push_back(isSeries ? measure.simulation.fileName : description_.measureFile);
-  }
-  for (std::vector<std::string>* const files : {&written, &read}) {
-    for (std::string& file : *files) file.erase(0, description_.baseFolder.size() + 1);
+  for (MeasureSource& source :
+       measureSources(description_.measures, description_.measureFile, description_.baseFolder)) {
+    names.push_back(std::move(source.name));
+    read.push_back(std::move(source.fileName));
   }
   return {parameters_.searchSpace(),
           parameterFields(parameters_, widestPlaceholders(templates_, parameters_.parameters().size())),
           std::move(names), std::move(written), std::move(read)};
 }
 
-PairComparison ModelRunner::pairComparison() const {
-  std::vector<std::string> names;
-  bool comparesSeries = false;
+RunComparison ModelRunner::runComparison() const {
   PairRules rules;
-  rules.requiresShare = description_.minimumCoverage > 0.0;
   for (std::size_t i = 0; i < description_.measures.size(); ++i) {
-    const OutputMeasure& measure = description_.measures[i];
-    names.push_back(measure.name);
-    if (measure.interfaceType != InterfaceType::timeSeries) continue;
-    comparesSeries = true;
+    if (description_.measures[i].interfaceType != InterfaceType::timeSeries) continue;
+    rules.requiresShare = description_.minimumCoverage > 0.0;
     rules.requiresProof = rules.requiresProof || !series_.needsPairs(i);
   }
-  return comparesSeries ? PairComparison(std::move(names), rules) : PairComparison();
+  return {measureSources(description_.measures, description_.measureFile, description_.baseFolder), rules};
 }
 
 std::string ModelRunner::slotPath(const std::string& baseFile, int slot) const {
@@ -316,7 +316,8 @@ void ModelRunner::updateResistanceNumbers(const std::string& path) {
 EvaluationResult ModelRunner::collect(int slot) {
   EvaluationResult result = judge(slot);
   for (std::string& line : sharedTargets_.takeChanged()) result.warnings.push_back(std::move(line));
-  if (result.ok() && shownRuns_.mayBeShown(slot, result.aggregate)) {
+  // A result that may turn out to be cut off must not keep others from being shown.
+  if (result.ok() && (mayBeCutOff(result) || shownRuns_.mayBeShown(slot, result.aggregate))) {
     for (const std::size_t i : shownMeasures_) {
       result.shownSeries.push_back(
           readPeriodSeries(series_.simulation(i), description_.measures[i].simulation, description_.period));
@@ -378,7 +379,15 @@ EvaluationResult ModelRunner::judge(int slot) {
                                     slot));
   }
   result.aggregate = aggregator_.aggregate(result.objectiveValues);
+  if (mayBeCutOff(result)) result.lastOutput = launcher_.lastOutput(slot, kEvidenceLines);
   return result;
+}
+
+bool ModelRunner::mayBeCutOff(const EvaluationResult& result) const {
+  return std::any_of(result.pairs.begin(), result.pairs.end(), [this](const MeasurePairs& pairs) {
+    const std::vector<std::size_t>& endless = standard_.withoutLineEnds;
+    return !pairs.file.endsLine && std::find(endless.begin(), endless.end(), pairs.measure) == endless.end();
+  });
 }
 
 void ModelRunner::keepOutputFiles(int slot, int number, EvaluationResult& result) const {
@@ -446,42 +455,55 @@ std::optional<EvaluationFailure> ModelRunner::findMissingResults(int slot) const
 
 std::optional<EvaluationFailure> ModelRunner::readMeasures(int slot, EvaluationResult& result) {
   const SlotFiles& files = slots_.at(static_cast<std::size_t>(slot - 1));
-  std::vector<double> written;
+  MeasureFile written;
   if (!files.measureFile.empty()) {
     std::string reason;
-    auto numbers = readMeasureFile(files.measureFile, reason);
-    if (!numbers) return makeFailure(Kind::resultsNotReadable, std::move(reason), slot);
-    written = std::move(*numbers);
+    auto file = readMeasureFile(files.measureFile, numbersNeeded_, reason);
+    if (!file) return makeFailure(Kind::resultsNotReadable, std::move(reason), slot);
+    written = std::move(*file);
   }
   if (auto unusable = series_.tryOpenSimulationFiles(files.simulationFiles)) {
     return makeFailure(Kind::resultsNotReadable, std::move(*unusable), slot);
   }
   std::optional<EvaluationFailure> failure;
+  std::vector<std::optional<FileForm>> forms(files.simulationFiles.size());
+  bool hasForm = false;  // of the output-measure file
   for (std::size_t i = 0; i < result.measureValues.size() && !failure; ++i) {
     const OutputMeasure& measure = description_.measures[i];
     if (measure.interfaceType != InterfaceType::measureFile) {
-      failure = readSeriesMeasure(slot, i, result);
+      std::optional<FileForm>& form = forms.at(series_.simulationIndex(i));
+      if (!form) form = formOfSeries(series_.simulation(i), description_.period);
+      failure = readSeriesMeasure(slot, i, *form, result);
       continue;
     }
+    if (!std::exchange(hasForm, true)) {
+      MeasurePairs& first = result.pairs.emplace_back();
+      first.measure = i;
+      first.file.endsLine = written.endsLine;
+      first.file.numberCount = written.numbers.size();
+    }
     const auto number = static_cast<std::size_t>(measure.measurementNo);
-    if (number <= written.size()) {
-      result.measureValues[i] = written[number - 1];
-      if (description_.computeExactMeasures) result.exactMeasures[i] = written[number - 1];
+    if (number <= written.numbers.size()) {
+      result.measureValues[i] = written.numbers[number - 1];
+      if (description_.computeExactMeasures) result.exactMeasures[i] = written.numbers[number - 1];
     } else {
       failure = makeFailure(
           Kind::resultsNotReadable,
-          fmt::format("{}: expected at least {} numbers, found {}", files.measureFile, number, written.size()), slot);
+          fmt::format("{}: expected at least {} numbers, found {}", files.measureFile, number, written.numbers.size()),
+          slot);
     }
   }
   for (const ObservedSeries& observed : observedSeries_) {
     if (failure) break;
     appendSimulatedValues(observed, description_.measures[observed.measure], description_.keptPrecision,
-                          series_.simulation(observed.measure), result.simulatedValues);
+                          description_.period.largestGapDays(), series_.simulation(observed.measure),
+                          result.simulatedValues);
   }
   return failure;
 }
 
-std::optional<EvaluationFailure> ModelRunner::readSeriesMeasure(int slot, std::size_t i, EvaluationResult& result) {
+std::optional<EvaluationFailure> ModelRunner::readSeriesMeasure(int slot, std::size_t i, const FileForm& form,
+                                                                EvaluationResult& result) {
   const OutputMeasure& measure = description_.measures[i];
   const std::string path = slotPath(measure.simulation.fileName, slot);
   TimeSeriesObject& simulation = series_.simulation(i);
@@ -493,7 +515,7 @@ std::optional<EvaluationFailure> ModelRunner::readSeriesMeasure(int slot, std::s
   }
   try {
     // A model that stopped early is a failed evaluation; a setup whose period no model run can match ends the run.
-    const bool canHavePairs = series_.needsPairs(i) || requiredPairs_.anyHasSucceeded;
+    const bool canHavePairs = series_.needsPairs(i) || standard_.anyHasSucceeded;
     if (canHavePairs && !hasPairs(measure, description_.period, simulation, series_.observation(i))) {
       return makeFailure(Kind::resultsNotWritten,
                          fmt::format("{}: item No. {} ({}) has no value at any observation time in the evaluation "
@@ -509,7 +531,7 @@ std::optional<EvaluationFailure> ModelRunner::readSeriesMeasure(int slot, std::s
           measureValue(measure, description_.period, simulation, series_.observation(i), SeriesPrecision::exact);
     }
     noteUnusedObservations(i, statistics, result);
-    result.pairs.push_back(pairsOf(i, statistics, simulation));
+    result.pairs.push_back(pairsOf(i, statistics, simulation, form));
     return findLackOfPairs(i, statistics.simulatedValues.size(), slot);
   } catch (const FatalError& error) {  // the message names the file as in the setup
     fatalError(error.message(), error.detail() + "\nread from " + path);
@@ -517,8 +539,8 @@ std::optional<EvaluationFailure> ModelRunner::readSeriesMeasure(int slot, std::s
 }
 
 std::optional<EvaluationFailure> ModelRunner::findLackOfPairs(std::size_t i, std::size_t count, int slot) const {
-  if (requiredPairs_.firstCounts.empty()) return std::nullopt;
-  const std::size_t ofFirst = requiredPairs_.firstCounts.at(i);
+  if (standard_.firstCounts.empty()) return std::nullopt;
+  const std::size_t ofFirst = standard_.firstCounts.at(i);
   // A quotient is rounded to the number that the setup gives, a product need not be: 3 of 30 pairs are 0.1.
   if (ofFirst == 0 || static_cast<double>(count) / static_cast<double>(ofFirst) >= description_.minimumCoverage) {
     return std::nullopt;
@@ -526,8 +548,8 @@ std::optional<EvaluationFailure> ModelRunner::findLackOfPairs(std::size_t i, std
   return makeFailure(Kind::tooFewPairs,
                      fmt::format("output measure \"{}\" has {} pairs of simulated and observed values, {} in the "
                                  "first successful run, No. {}: a share below Minimum_Coverage = {}",
-                                 trimTrailing(description_.measures[i].name), count, ofFirst,
-                                 requiredPairs_.firstNumber, formatReal(description_.minimumCoverage)),
+                                 trimTrailing(description_.measures[i].name), count, ofFirst, standard_.firstNumber,
+                                 formatReal(description_.minimumCoverage)),
                      slot);
 }
 

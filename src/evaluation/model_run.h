@@ -9,7 +9,7 @@
 #include "evaluation/equal_measures.h"
 #include "evaluation/evaluation_result.h"
 #include "evaluation/folder_damage.h"
-#include "evaluation/pair_comparison.h"
+#include "evaluation/run_comparison.h"
 #include "evaluation/saved_files.h"
 #include "evaluation/shown_runs.h"
 #include "measures/measure_statistics.h"
@@ -56,8 +56,8 @@ class ModelRunner final {
   /// Why the set cannot be run; empty if it can.
   std::optional<EvaluationFailure> findUnrunnable(std::span<const double> set);
 
-  /// From now on a model run with less than the least share of these pairs is a failed evaluation.
-  void requirePairs(RequiredPairs required) { requiredPairs_ = std::move(required); }
+  /// From now on a model run with less than the least share of its pairs is a failed evaluation.
+  void setStandard(RunStandard standard) { standard_ = std::move(standard); }
 
   /// To be called before a model run in the slot: if the run before it has damaged the process folder, makes that anew,
   /// with a line in `warnings`. Returns why the slot cannot be used any more: this failed, or the run in the folder
@@ -96,8 +96,8 @@ class ModelRunner final {
   const std::vector<ParameterTemplate>& templates() const { return templates_; }
   /// A check for a model that ignores its parameters, for the evaluations of a run.
   EqualMeasures equalMeasures() const;
-  /// A comparison of the pairs of model runs, for the evaluations of a run.
-  PairComparison pairComparison() const;
+  /// A comparison of model runs with the first successful one, for the evaluations of a run.
+  RunComparison runComparison() const;
   /// What the user should know of links in the model's folder, and templateDoubts() of all templates.
   const std::vector<std::string>& warnings() const { return warnings_; }
   const std::vector<std::string>& seriesWarnings() const { return series_.warnings(); }
@@ -128,7 +128,10 @@ class ModelRunner final {
   /// Fills in the measures and simulated values and leaves the series open; returns a failure if the model's output
   /// cannot be used.
   std::optional<EvaluationFailure> readMeasures(int slot, EvaluationResult& result);
-  std::optional<EvaluationFailure> readSeriesMeasure(int slot, std::size_t measure, EvaluationResult& result);
+  std::optional<EvaluationFailure> readSeriesMeasure(int slot, std::size_t measure, const FileForm& form,
+                                                     EvaluationResult& result);
+  /// Whether the first successful run may show that the result is no whole one, see RunComparison::judge().
+  bool mayBeCutOff(const EvaluationResult& result) const;
   std::optional<EvaluationFailure> findLackOfPairs(std::size_t measure, std::size_t count, int slot) const;
   void noteUnusedObservations(std::size_t measure, const MeasureStatistics& statistics, EvaluationResult& result) const;
   EvaluationFailure makeFailure(EvaluationFailure::Kind kind, std::string reason, int slot) const;
@@ -143,12 +146,13 @@ class ModelRunner final {
   std::vector<std::string> convertedTexts_;   ///< one per parameter file: that of a converted numeric-ID template
   std::vector<std::string> warnings_;
   SeriesTables series_;
+  std::size_t numbersNeeded_ = 0;  ///< in the output-measure file
   SavedFiles savedFiles_;
   SharedTargets sharedTargets_;  ///< looked at again after the first model run
   std::vector<ObservedSeries> observedSeries_;
   std::vector<std::size_t> shownMeasures_;
   ShownRuns shownRuns_;
-  RequiredPairs requiredPairs_;
+  RunStandard standard_;
   std::vector<SlotFiles> slots_;
 };
 

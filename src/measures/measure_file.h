@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -7,12 +8,19 @@
 
 namespace mirevo {
 
+/// What a model wrote to an output-measure file.
+struct MeasureFile {
+  std::vector<double> numbers;
+  bool endsLine = true;  ///< the last line has an end
+};
+
 /// The numbers of an output-measure file in free format: separated by blanks, tabs, commas, semicolons or line ends,
-/// `#` comments to the end of the line. Empty, with line and cause in `reason`, when it cannot be read or something in
-/// it is not a number.
-std::optional<std::vector<double>> readMeasureFile(const std::string& fileName, std::string& reason);
+/// `#` comments to the end of the line. Empty, with line and cause in `reason`, when it cannot be read, when something
+/// in it is not a number, and when it could as well be meant with decimal commas: if each of its words is a number then
+/// (`0,153`), and they are at least `neededCount`, the number of the last that is used.
+std::optional<MeasureFile> readMeasureFile(const std::string& fileName, std::size_t neededCount, std::string& reason);
 /// The same for content in memory; `sourceName` is used in `reason`.
-std::optional<std::vector<double>> parseMeasureFile(const std::string& sourceName, std::string_view content,
-                                                    std::string& reason);
+std::optional<MeasureFile> parseMeasureFile(const std::string& sourceName, std::string_view content,
+                                            std::size_t neededCount, std::string& reason);
 
 }  // namespace mirevo

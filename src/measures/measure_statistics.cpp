@@ -25,9 +25,9 @@ struct SeriesItem {
   std::optional<float> deleteValue;
   std::optional<std::span<const double>> exact;  ///< its values in 64 bits; none where those in 32 bits are used
 
-  std::optional<double> valueAtTime(double time, std::size_t& hint) const {
-    if (exact) return exactValueAt(series.times(), *exact, time, hint);
-    return valueAt(series, item, time, hint);
+  std::optional<double> valueAtTime(double time, std::size_t& hint, double largestGap) const {
+    if (exact) return exactValueAt(series.times(), *exact, time, hint, largestGap);
+    return valueAt(series, item, time, hint, largestGap);
   }
 };
 
@@ -102,7 +102,7 @@ void forEachObservation(const SeriesItem& simulation, const SeriesItem& observat
     if (time > days.end + kSameTimeDays) break;
     if (isMissing(observed[k], observation.deleteValue)) continue;
     const double value = observation.exact ? (*observation.exact)[k] : observed[k];
-    if (!use(time, value, simulation.valueAtTime(time, hint))) break;
+    if (!use(time, value, simulation.valueAtTime(time, hint, period.largestGapDays()))) break;
   }
 }
 

@@ -38,7 +38,7 @@ std::size_t simulatedValueCount(std::span<const ObservedSeries> observed, Series
 }
 
 void appendSimulatedValues(const ObservedSeries& observed, const OutputMeasure& measure, SeriesPrecision precision,
-                           TimeSeriesObject& simulation, std::vector<double>& values) {
+                           double largestGap, TimeSeriesObject& simulation, std::vector<double>& values) {
   requireItem(simulation, measure.simulation);
   const std::optional<DateRecord> start = simulation.startTime();
   const double offset = start ? daysSince(*start, observed.start) : 0.0;
@@ -51,12 +51,15 @@ void appendSimulatedValues(const ObservedSeries& observed, const OutputMeasure& 
     }
   };
   if (precision == SeriesPrecision::single) {
-    append(
-        [&](double days, std::size_t& hint) -> std::optional<double> { return valueAt(simulation, item, days, hint); });
+    append([&](double days, std::size_t& hint) -> std::optional<double> {
+      return valueAt(simulation, item, days, hint, largestGap);
+    });
     return;
   }
   const auto appendExact = [&](std::span<const double> series) {
-    append([&](double days, std::size_t& hint) { return exactValueAt(simulation.times(), series, days, hint); });
+    append([&](double days, std::size_t& hint) {
+      return exactValueAt(simulation.times(), series, days, hint, largestGap);
+    });
   };
   appendExact(simulation.exactValues(item));
   appendExact(simulation.units(item));

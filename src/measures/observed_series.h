@@ -26,9 +26,10 @@ ObservedSeries readObservedSeries(std::size_t index, const OutputMeasure& measur
 /// How many numbers appendSimulatedValues() appends for these series.
 std::size_t simulatedValueCount(std::span<const ObservedSeries> observed, SeriesPrecision precision);
 
-/// Appends the simulated value at each observation time to `values`, NaN where there is none. If exact, the unit in
+/// Appends the simulated value at each observation time to `values`, NaN where there is none, as between steps farther
+/// apart than `largestGap` (days). If exact, the unit in
 /// which the file gives each of them follows (interpolated as the values are), NaN where there is none.
 void appendSimulatedValues(const ObservedSeries& observed, const OutputMeasure& measure, SeriesPrecision precision,
-                           TimeSeriesObject& simulation, std::vector<double>& values);
+                           double largestGap, TimeSeriesObject& simulation, std::vector<double>& values);
 
 }  // namespace mirevo

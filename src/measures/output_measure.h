@@ -5,6 +5,7 @@
 
 #include "common/date_record.h"
 #include "common/settings/code_name.h"
+#include "platform/series/time_series_object.h"
 
 namespace mirevo {
 
@@ -47,9 +48,14 @@ struct OutputMeasure {
 /// Values of series in 32 bits, as the statistics of a run use them, or with all digits of their file.
 enum class SeriesPrecision { single, exact };
 
+/// Which observations count.
 struct EvaluationPeriod {
   DateRecord start{};
   DateRecord end{};
+  /// Those between two simulated steps farther apart than this have no simulated value; 0: interpolated over any gap.
+  double largestGapHours = 0.0;
+
+  double largestGapDays() const { return largestGapHours > 0.0 ? largestGapHours / 24.0 : kAnyGap; }
 };
 
 }  // namespace mirevo

@@ -9,6 +9,11 @@
 #include "measures/measure_statistics.h"
 
 namespace mirevo {
+namespace {
+
+constexpr double kSecondsPerDay = 86400.0;
+
+}  // namespace
 
 PeriodSeries readPeriodSeries(TimeSeriesObject& series, const SeriesReference& reference,
                               const EvaluationPeriod& period) {
@@ -16,7 +21,6 @@ PeriodSeries readPeriodSeries(TimeSeriesObject& series, const SeriesReference& r
   PeriodSeries read;
   const std::optional<DateRecord> start = series.startTime();
   if (!start) return read;
-  constexpr double kSecondsPerDay = 86400.0;
   const std::int64_t origin = secondNumber(*start);
   const std::span<const double> times = series.times();
   const std::span<const float> values = series.values(reference.itemNo);
@@ -38,7 +42,8 @@ PeriodSeries readPeriodSeries(TimeSeriesObject& series, const SeriesReference& r
   return read;
 }
 
-std::vector<float> valuesAt(const PeriodSeries& series, std::span<const std::int64_t> seconds) {
+std::vector<float> valuesAt(const PeriodSeries& series, std::span<const std::int64_t> seconds, double largestGap) {
+  const double largestWidth = (largestGap + kSameTimeDays) * kSecondsPerDay;
   std::vector<float> values(seconds.size(), std::numeric_limits<float>::quiet_NaN());
   std::size_t next = 0;  // first step that is not before the time
   for (std::size_t i = 0; i < seconds.size(); ++i) {
@@ -49,6 +54,7 @@ std::vector<float> valuesAt(const PeriodSeries& series, std::span<const std::int
     } else if (next > 0) {
       const auto before = static_cast<double>(seconds[i] - series.seconds[next - 1]);
       const auto width = static_cast<double>(series.seconds[next] - series.seconds[next - 1]);
+      if (width > largestWidth) continue;
       const double below = series.values[next - 1];
       values[i] = static_cast<float>(below + (series.values[next] - below) * before / width);
     }

@@ -25,8 +25,10 @@ PeriodSeries readPeriodSeries(TimeSeriesObject& series, const SeriesReference& r
                               const EvaluationPeriod& period);
 
 /// The values at the given times (ascending): that of a step at the time, else interpolated linearly between its two
-/// neighbours as for the output measures; NaN outside the time axis or next to a missing value.
-std::vector<float> valuesAt(const PeriodSeries& series, std::span<const std::int64_t> seconds);
+/// neighbours as for the output measures; NaN outside the time axis, next to a missing value, and between two steps
+/// that are farther apart than `largestGap` (days).
+std::vector<float> valuesAt(const PeriodSeries& series, std::span<const std::int64_t> seconds,
+                            double largestGap = kAnyGap);
 
 /// Whether two measures compare the same two series.
 bool isSamePair(const OutputMeasure& a, const OutputMeasure& b);

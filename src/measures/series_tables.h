@@ -36,6 +36,8 @@ class SeriesTables final {
   /// The file of the measure with this 0-based index; simulation() may be called only between open and release.
   TimeSeriesObject& observation(std::size_t measure);
   TimeSeriesObject& simulation(std::size_t measure);
+  /// Which of simulationFileNames() that is.
+  std::size_t simulationIndex(std::size_t measure) const { return simulationIndex_.at(measure); }
   /// What seems to be meant in another way in files as they were found at the start, with their locations in the setup.
   const std::vector<std::string>& warnings() const { return warnings_; }
   /// Whether a model run without a simulated value for any observation of the measure in the period is the run's own

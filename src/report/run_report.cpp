@@ -18,7 +18,7 @@
 #include "common/run_files.h"
 #include "common/version.h"
 #include "evaluation/chosen_evaluations.h"
-#include "evaluation/pair_comparison.h"
+#include "evaluation/run_comparison.h"
 #include "measures/period_series.h"
 #include "parameters/parameter_model.h"
 #include "report/page/page_template.h"
@@ -58,7 +58,7 @@ class ReportBuilder final {
   void findBestAndInitial();
   void addMeasures();
   PairsByNumber pairsOfRuns() const;
-  void noteFewerPairsOfBest();
+  void noteDifferencesOfBest();
   void addFailures();
   void addSeries();
   void addAnalyses();
@@ -111,7 +111,7 @@ ReportData ReportBuilder::build() {
   findBestAndInitial();
   data_.parameters = reportedParameters(config_, parameters_, best_);
   addMeasures();
-  noteFewerPairsOfBest();
+  noteDifferencesOfBest();
   addFailures();
   addSeries();
   addAnalyses();
@@ -248,22 +248,19 @@ PairsByNumber ReportBuilder::pairsOfRuns() const {
 }
 
 /// In a run that has come to its end, other than by a signal, the closing lines of its results say so.
-void ReportBuilder::noteFewerPairsOfBest() {
+void ReportBuilder::noteDifferencesOfBest() {
   if (best_ == nullptr) return;
-  const std::string sentence = bestHasFewerPairs(best_->number);
-  const bool isSaid = std::any_of(data_.summary.begin(), data_.summary.end(),
-                                  [&](const std::string& line) { return line.find(sentence) != std::string::npos; });
-  if (isSaid) return;
   const PairsByNumber pairs = pairsOfRuns();
   const auto ofBest = pairs.find(best_->number);
   if (ofBest == pairs.end()) return;
-  for (const MeasurePairs& found : ofBest->second) {
-    const std::vector<MeasurePairs>& first = pairs.begin()->second;
-    const auto same = std::find_if(first.begin(), first.end(),
-                                   [&found](const MeasurePairs& other) { return other.measure == found.measure; });
-    if (same == first.end() || found.count >= same->count || found.measure >= config_.measures.size()) continue;
-    note(fmt::format("{}: output measure \"{}\" has {} pairs, {} in the first successful run, No. {}.", sentence,
-                     config_.measures[found.measure].name, found.count, same->count, pairs.begin()->first));
+  const auto& [firstNumber, first] = *pairs.begin();
+  const auto differences = findDifferences(best_->number, ofBest->second, firstNumber, first,
+                                           measureSources(config_.measures, config_.measureFile, config_.baseFolder));
+  for (const std::string& text : sentencesOnBest(best_->number, differences)) {
+    const std::string sentence = text.substr(0, text.find(':'));
+    const bool isSaid = std::any_of(data_.summary.begin(), data_.summary.end(),
+                                    [&](const std::string& line) { return line.find(sentence) != std::string::npos; });
+    if (!isSaid) note(text + ".");
   }
 }
 

@@ -312,6 +312,7 @@ void RunDriver::openSeries() {
   run.observations = runner_->readShownObservations();
   run.periodFirst = secondNumber(config_.period.start);
   run.periodLast = secondNumber(config_.period.end);
+  run.largestGap = config_.period.largestGapDays();
   warnOfLastDay();
   run.initialValues = ToModelScale(parameters_->searchSpace(), parameters_->searchSpace().initial);
   run.kept = keptSeries();
@@ -410,9 +411,9 @@ std::vector<std::string> RunDriver::keepStatistics() {
 std::vector<std::string> RunDriver::closingLines(const Ending& ending) const {
   std::vector<std::string> lines{ending.closingLine, "Ended: " + ending.time};
   if (!reporter_) return lines;
-  const std::vector<std::string> fewerPairs = reporter_->fewerPairsLines();
+  const std::vector<std::string> differences = reporter_->differenceLines();
   if (!reporter_->best()) {
-    lines.insert(lines.end(), fewerPairs.begin(), fewerPairs.end());
+    lines.insert(lines.end(), differences.begin(), differences.end());
     return lines;
   }
   const std::vector<std::string> scales = aggregator_->scaleLines();
@@ -424,8 +425,8 @@ std::vector<std::string> RunDriver::closingLines(const Ending& ending) const {
   for (std::size_t i = 0; i < names.size(); ++i) {
     lines.push_back(fmt::format("Best {} = {}", names[i], formatReal(best.parameterValues[i])));
   }
-  if (const std::string text = reporter_->fewerPairsOfBest(); !text.empty()) lines.push_back("Warning: " + text);
-  lines.insert(lines.end(), fewerPairs.begin(), fewerPairs.end());
+  for (const std::string& text : reporter_->differencesOfBest()) lines.push_back("Warning: " + text);
+  lines.insert(lines.end(), differences.begin(), differences.end());
   return lines;
 }
 
@@ -482,7 +483,7 @@ void RunDriver::reportRun() {
 
 void RunDriver::finish(const TaskOutcome& outcome) {
   results_->close();
-  logFewerPairs();
+  logDifferences();
   results_->writeTables(outcome.tables, state_.log);
   const Ending ending{RunStage::finished, outcome.terminationMessage, outcome.terminationMessage};
   if (const auto unwritten = closeResults(ending, outcome.report)) {
@@ -515,7 +516,7 @@ void RunDriver::finish(const TaskOutcome& outcome) {
   if (count == 0) {
     showMessage("Nothing was run: the setup selects no task or no search", {}, MessageType::warning);
   }
-  tellOfBestWithFewerPairs();
+  tellOfBestThatDiffers();
   tellOfWarnings();
 }
 
@@ -543,19 +544,19 @@ void RunDriver::logFailures() {
   for (const std::string& line : reporter_->failures().lines()) state_.log.line(line);
 }
 
-/// Warns of evaluations that are judged by fewer observations than the first successful run, and of the best if it is
-/// one of them, which is known when the aggregates are.
-void RunDriver::logFewerPairs() {
-  if (!reporter_ || std::exchange(hasLoggedFewerPairs_, true)) return;
+/// Warns of evaluations that differ from the first successful run, and of the best if it is one of them, which is known
+/// when the aggregates are.
+void RunDriver::logDifferences() {
+  if (!reporter_ || std::exchange(hasLoggedDifferences_, true)) return;
   reporter_->settle(*aggregator_);
-  if (const std::string text = reporter_->fewerPairsWarning(); !text.empty()) state_.log.warning(text);
-  if (const std::string text = reporter_->fewerPairsOfBest(); !text.empty()) state_.log.warning(text);
+  for (const std::string& text : reporter_->differenceWarnings()) state_.log.warning(text);
+  for (const std::string& text : reporter_->differencesOfBest()) state_.log.warning(text);
 }
 
 /// After the message that ends an unfinished run, which is the first thing that the user reads.
-void RunDriver::tellOfBestWithFewerPairs() const {
-  const std::string text = reporter_ ? reporter_->fewerPairsOfBest() : std::string();
-  if (!text.empty()) showMessage(text, {}, MessageType::warning);
+void RunDriver::tellOfBestThatDiffers() const {
+  if (!reporter_) return;
+  for (const std::string& text : reporter_->differencesOfBest()) showMessage(text, {}, MessageType::warning);
 }
 
 /// Nothing that goes wrong here may hide why the run ended.
@@ -581,10 +582,10 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
     }
     if (!details.empty()) explained += "\n" + details;
     statistics = keepStatistics();
-    logFewerPairs();
+    logDifferences();
     endLogInError(text, details);
     showMessage(explained);
-    tellOfBestWithFewerPairs();
+    tellOfBestThatDiffers();
   }
   closeResultsOfEarlyEnd({RunStage::failed, std::string(message), explained}, statistics);
   if (launcher_) launcher_->haltProcesses();  // before the report, which takes time
@@ -617,8 +618,8 @@ void RunDriver::closeLog() {
 int RunDriver::endCancelled(std::string_view message) {
   showMessage(message, {}, MessageType::information);
   const std::vector<std::string> statistics = keepStatistics();
-  logFewerPairs();
-  tellOfBestWithFewerPairs();
+  logDifferences();
+  tellOfBestThatDiffers();
   closeResultsOfEarlyEnd({RunStage::cancelled, std::string(message), std::string(message)}, statistics);
   {
     const EndingSignalsHeld held;

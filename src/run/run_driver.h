@@ -77,8 +77,8 @@ class RunDriver final {
   void reportRun();
   void finish(const TaskOutcome& outcome);
   void logFailures();
-  void logFewerPairs();
-  void tellOfBestWithFewerPairs() const;
+  void logDifferences();
+  void tellOfBestThatDiffers() const;
   int endInError(std::string_view message, std::string_view detail);
   void endLogInError(std::string_view message, std::string_view details);
   void closeLog();
@@ -109,7 +109,7 @@ class RunDriver final {
   std::unique_ptr<ModelRunner> runner_;
   std::unique_ptr<Evaluator> evaluator_;
   std::optional<TaskOutcome> outcome_;  ///< of the task, once it has come to its end
-  bool hasLoggedFewerPairs_ = false;
+  bool hasLoggedDifferences_ = false;
 };
 
 }  // namespace mirevo

@@ -1,5 +1,6 @@
 #include "run/run_reporter.h"
 
+#include <algorithm>
 #include <cmath>
 
 #include <fmt/core.h>
@@ -12,7 +13,13 @@
 namespace mirevo {
 namespace {
 
-constexpr std::size_t kMostShownWithFewerPairs = 20;
+/// Of each kind in the result file; as warnings in the log, behind which the others are plain lines.
+constexpr std::size_t kMostDifferencesShown = 20;
+
+const DifferenceTexts& textsOf(RunDifference::Kind kind) {
+  const std::span<const DifferenceTexts> all = differenceTexts();
+  return *std::find_if(all.begin(), all.end(), [kind](const DifferenceTexts& texts) { return texts.kind == kind; });
+}
 
 }  // namespace
 
@@ -68,58 +75,79 @@ void RunReporter::evaluationReplayed(std::span<const double> set, const Evaluati
   }
 }
 
-void RunReporter::pairsFound(const PairsFound& found) {
+void RunReporter::runCompared(const ComparisonFindings& found) {
   if (found.firstNumber != 0) firstSuccess_ = found.firstNumber;
   for (const std::string& line : found.firstLines) state_.log.line(line);
-  for (const FewerPairs& fewer : found.fewer) {
-    if (!fewer.isWarnedOf) {
-      state_.log.line(fmt::format("   {}: {}", progress::nameOfEvaluation(fewer.number), fewer.text));
+  for (const RunDifference& difference : found.differences) {
+    const std::string text = fmt::format("{}: {}", progress::nameOfEvaluation(difference.number), difference.text);
+    if (textsOf(difference.kind).isWarnedOf && differencesWarnedOf_ < kMostDifferencesShown) {
+      ++differencesWarnedOf_;
+      state_.log.warning(text);
+    } else if (!difference.isTold) {
+      state_.log.line("   " + text);
     }
-    fewer_[fewer.number].insert_or_assign(fewer.measure, fewer.text);
+    differences_.insert_or_assign({difference.kind, difference.number, difference.measure}, difference);
   }
   others_.insert(found.others.begin(), found.others.end());
+  if (!found.doubtOfFirst.empty()) state_.log.warning(found.doubtOfFirst);
 }
 
-std::string RunReporter::fewerPairsText(int number) const {
-  const auto found = fewer_.find(number);
-  if (found == fewer_.end()) return {};
-  std::string text;
-  for (const auto& [measure, part] : found->second) text.append(text.empty() ? "" : "; ").append(part);
-  return text;
-}
-
-std::vector<std::string> RunReporter::fewerPairsLines() const {
-  std::vector<std::string> lines;
-  for (const auto& [number, parts] : fewer_) {
-    if (lines.size() == kMostShownWithFewerPairs) break;
-    lines.push_back(fmt::format("Fewer pairs: evaluation {}: {}", number, fewerPairsText(number)));
+std::map<int, std::string> RunReporter::differencesOfKind(RunDifference::Kind kind) const {
+  std::map<int, std::string> found;
+  for (const auto& [key, difference] : differences_) {
+    if (difference.kind != kind) continue;
+    std::string& text = found[difference.number];
+    text.append(text.empty() ? "" : "; ").append(difference.text);
   }
-  if (const std::size_t more = fewer_.size() - lines.size(); more > 0) {
-    lines.push_back(fmt::format("Fewer pairs: {} more evaluation{}{}", more, more == 1 ? "" : "s",
+  return found;
+}
+
+std::vector<std::string> RunReporter::differenceLines() const {
+  std::vector<std::string> lines;
+  for (const DifferenceTexts& texts : differenceTexts()) {
+    const std::map<int, std::string> found = differencesOfKind(texts.kind);
+    std::size_t shown = 0;
+    for (const auto& [number, text] : found) {
+      if (shown == kMostDifferencesShown) break;
+      ++shown;
+      lines.push_back(fmt::format("{}: evaluation {}: {}", texts.title, number, text));
+    }
+    const std::size_t more = found.size() - shown;
+    if (more == 0) continue;
+    lines.push_back(fmt::format("{}: {} more evaluation{}{}", texts.title, more, more == 1 ? "" : "s",
                                 pairs_ == nullptr ? "" : ", see " + fileNameOf(pairs_->path())));
   }
   return lines;
 }
 
-std::string RunReporter::fewerPairsWarning() const {
-  if (fewer_.empty()) return {};
-  const bool isOne = fewer_.size() == 1;
-  const char* const named = fewer_.size() > kMostShownWithFewerPairs ? "the first of them" : isOne ? "it" : "them";
-  return fmt::format("{} judged by fewer observations than the first successful run: the end of {} names {}",
-                     isOne ? "1 evaluation is" : fmt::format("{} evaluations are", fewer_.size()),
-                     fileNameOf(results_.path()), named);
+std::vector<std::string> RunReporter::differenceWarnings() const {
+  std::vector<std::string> sentences;
+  for (const DifferenceTexts& texts : differenceTexts()) {
+    const std::size_t count = differencesOfKind(texts.kind).size();
+    if (count == 0) continue;
+    const bool isOne = count == 1;
+    const char* const named = count > kMostDifferencesShown ? "the first of them" : isOne ? "it" : "them";
+    sentences.push_back(fmt::format("{} {}: the end of {} names {}",
+                                    isOne ? "1 evaluation" : fmt::format("{} evaluations", count),
+                                    isOne ? texts.ofOne : texts.ofSeveral, fileNameOf(results_.path()), named));
+  }
+  return sentences;
 }
 
-std::string RunReporter::fewerPairsOfBest() const {
-  const std::string text = best() ? fewerPairsText(best()->number) : std::string();
-  return text.empty() ? text : fmt::format("{}: {}", bestHasFewerPairs(best()->number), text);
+std::vector<std::string> RunReporter::differencesOfBest() const {
+  if (!best()) return {};
+  std::vector<RunDifference> ofBest;
+  for (const auto& [key, difference] : differences_) {
+    if (difference.number == best()->number) ofBest.push_back(difference);
+  }
+  return sentencesOnBest(best()->number, ofBest);
 }
 
 std::set<int> RunReporter::numbersWithPairs() const {
   if (firstSuccess_ == 0) return {};
   std::set<int> numbers = others_;
   numbers.insert(firstSuccess_);
-  for (const auto& [number, parts] : fewer_) numbers.insert(number);
+  for (const auto& [key, difference] : differences_) numbers.insert(difference.number);
   return numbers;
 }
 

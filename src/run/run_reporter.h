@@ -4,7 +4,7 @@
 #include <optional>
 #include <set>
 #include <string>
-#include <utility>
+#include <tuple>
 #include <vector>
 
 #include "algorithms/searches/search_algorithm.h"
@@ -38,7 +38,7 @@ class RunReporter final : public EvaluationObserver {
   void recordEvaluation(std::span<const double> set, const EvaluationResult& result) override;
   void evaluationFinished(std::span<const double> set, const EvaluationResult& result) override;
   void evaluationReplayed(std::span<const double> set, const EvaluationResult& result) override;
-  void pairsFound(const PairsFound& found) override;
+  void runCompared(const ComparisonFindings& found) override;
   bool isCancelled() override { return state_.progress.isCancelled(); }
 
   /// At the end of a run: fills in the aggregates of evaluations made before the transformation of the objective
@@ -53,15 +53,15 @@ class RunReporter final : public EvaluationObserver {
   /// The number of the initial evaluation; empty before an evaluation has succeeded.
   const std::optional<int>& initial() const { return initial_.number(); }
 
-  /// The evaluations that have fewer pairs than the first successful run: one line for each of the first of them, and
-  /// how many more. Empty without any.
-  std::vector<std::string> fewerPairsLines() const;
-  /// A sentence that says how many there are, and where those lines are; empty without any.
-  std::string fewerPairsWarning() const;
-  /// A sentence that says so of the best evaluation; empty if it has all of them.
-  std::string fewerPairsOfBest() const;
-  /// The first successful run and the evaluations that have other pairs; empty as long as it is not known which is the
-  /// first successful one.
+  /// The evaluations that differ from the first successful run: for each kind of difference one line for each of the
+  /// first of them, and how many more. Empty without any.
+  std::vector<std::string> differenceLines() const;
+  /// A sentence for each kind of difference that says how many evaluations there are, and where those lines are.
+  std::vector<std::string> differenceWarnings() const;
+  /// Sentences that say so of the best evaluation.
+  std::vector<std::string> differencesOfBest() const;
+  /// The first successful run and the evaluations that differ or have other pairs; empty as long as it is not known
+  /// which is the first successful one.
   std::set<int> numbersWithPairs() const;
 
   int evaluationCount() const { return evaluationCount_; }
@@ -83,8 +83,8 @@ class RunReporter final : public EvaluationObserver {
   void considerAsBest(int number, double aggregate, const std::vector<double>& parameterValues,
                       std::string_view foundAt);
   void requireLogWritten() const;
-  /// What is said of the pairs of this evaluation, of all measures with fewer; empty without any.
-  std::string fewerPairsText(int number) const;
+  /// What is said of each evaluation that differs in this, of all its measures.
+  std::map<int, std::string> differencesOfKind(RunDifference::Kind kind) const;
 
   RunState& state_;
   ResultFile& results_;
@@ -100,9 +100,11 @@ class RunReporter final : public EvaluationObserver {
   int failedCount_ = 0;
   int replayedCount_ = 0;
   FailureSummary failures_;
-  int firstSuccess_ = 0;                                     ///< with whose pairs others are compared
-  std::map<int, std::map<std::size_t, std::string>> fewer_;  ///< what is said of it, by evaluation and measure
-  std::set<int> others_;  ///< evaluations with as many pairs or more, of other observations
+  int firstSuccess_ = 0;  ///< with which others are compared
+  /// By kind, evaluation and measure.
+  std::map<std::tuple<RunDifference::Kind, int, std::size_t>, RunDifference> differences_;
+  std::set<int> others_;                 ///< evaluations without such a difference, with pairs of other observations
+  std::size_t differencesWarnedOf_ = 0;  ///< one by one
 };
 
 }  // namespace mirevo

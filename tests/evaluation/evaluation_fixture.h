@@ -30,11 +30,12 @@ class RecordingObserver final : public EvaluationObserver {
   void evaluationReplayed(std::span<const double> set, const EvaluationResult& result) override {
     events.push_back(fmt::format("replay {} a={} {}", result.number, set[0], result.ok() ? "OK" : "FAILED"));
   }
-  void pairsFound(const PairsFound& found) override {
+  void runCompared(const ComparisonFindings& found) override {
     if (found.firstNumber != 0) pairs.push_back(fmt::format("first {}", found.firstNumber));
-    for (const FewerPairs& fewer : found.fewer) {
-      pairs.push_back(fmt::format("{} has {} of {}", fewer.number, fewer.count, fewer.firstCount));
+    for (const RunDifference& difference : found.differences) {
+      pairs.push_back(fmt::format("{}: {}", difference.number, difference.text));
     }
+    if (!found.doubtOfFirst.empty()) pairs.push_back(found.doubtOfFirst);
   }
   bool isCancelled() override { return cancelled; }
 

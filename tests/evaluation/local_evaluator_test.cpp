@@ -149,12 +149,16 @@ TEST_F(LocalEvaluatorTest, ARunWithoutPairsIsAFailedOneAsSoonAsAnotherHasShownTh
 
 TEST_F(LocalEvaluatorTest, RunsAreComparedWithTheFirstSuccessWhateverEndsFirst) {
   const std::vector<std::size_t> days{0, 4, 5, 2, 3};  // that each run writes; 0: it fails
+  const auto fewer = [](int number, int count, int firstCount, int first) {
+    return fmt::format("{}: output measure \"bias\" has {} pairs, {} in the first successful run, No. {}", number,
+                       count, firstCount, first);
+  };
   // coverage, evaluations of an earlier run, what fails, what is told of the pairs
   const std::tuple<double, std::map<int, double>, std::vector<int>, std::vector<std::string>> cases[] = {
-      {0.0, {}, {1}, {"first 2", "4 has 2 of 4", "5 has 3 of 4"}},
-      {0.5, {}, {1}, {"first 2", "4 has 2 of 4", "5 has 3 of 4"}},
-      {0.6, {}, {1, 4}, {"first 2", "5 has 3 of 4"}},
-      {0.6, {{1, 2.0}}, {4}, {"first 1", "2 has 4 of 5", "5 has 3 of 5"}},  // 3 of 5 are 0.6
+      {0.0, {}, {1}, {"first 2", fewer(4, 2, 4, 2), fewer(5, 3, 4, 2)}},
+      {0.5, {}, {1}, {"first 2", fewer(4, 2, 4, 2), fewer(5, 3, 4, 2)}},
+      {0.6, {}, {1, 4}, {"first 2", fewer(5, 3, 4, 2)}},
+      {0.6, {{1, 2.0}}, {4}, {"first 1", fewer(2, 4, 5, 1), fewer(5, 3, 5, 1)}},  // 3 of 5 are 0.6
       {1.0, {{1, -2.0}, {2, 2.0}}, {1, 4, 5}, {"first 2"}},
   };
   for (const auto& [coverage, earlier, failing, told] : cases) {
@@ -181,6 +185,57 @@ TEST_F(LocalEvaluatorTest, RunsAreComparedWithTheFirstSuccessWhateverEndsFirst) 
       }
       EXPECT_EQ(failed, failing) << coverage << " " << slots;
       EXPECT_THAT(observer_.pairs, testing::UnorderedElementsAreArray(told)) << coverage << " " << slots;
+    }
+  }
+}
+
+TEST_F(LocalEvaluatorTest, FilesThatLackWhatThoseOfTheFirstSuccessHaveAreToldWhateverEndsFirst) {
+  const std::string whole = series(3.0);
+  const std::string cut = whole.substr(0, whole.size() - 1);
+  const std::string gap = std::string(whole).erase(whole.find("2001-01-03"), 13);
+  const std::string doubt =
+      "The last line of simulated.csv has an end in later runs, and none in the first successful run, No. 2, which may "
+      "be cut off";
+  // what each run writes, if it does not fail; what fails; what is told
+  const std::tuple<std::vector<std::string>, std::vector<int>, std::vector<std::string>> cases[] = {
+      {{whole, cut, gap, cut},
+       {2, 4},
+       {"first 1",
+        "3: simulated.csv has no time step between 2001-01-02 00:00 and 2001-01-04 00:00, 48 hours; in the first "
+        "successful run, No. 1, steps are at most 24 hours apart"}},
+      {{gap, cut, whole, gap}, {2}, {"first 1"}},
+      {{"", cut, cut, cut}, {1}, {"first 2"}},
+      {{"", cut, cut, whole}, {1}, {"first 2", doubt}},
+  };
+  description_.failedFolderPrefix = folder_ / "run_Failed";
+  for (const auto& [written, failing, told] : cases) {
+    for (const int slots : {1, 3}) {
+      SCOPED_TRACE(told.back() + fmt::format(" {}", slots));
+      observer_.pairs.clear();
+      foldersToKeep_ = 1;
+      FakeLauncher launcher([&](int start, const std::string&) {
+        const std::string& content = written.at(static_cast<std::size_t>(start - 1));
+        FakeLauncher::Batch batch = content.empty() ? fails(9.0) : computes(9.0 - start);
+        batch.output = {"last words"};
+        batch.write = [&content](const std::string& folder) { std::ofstream(folder + "/simulated.csv") << content; };
+        return batch;
+      });
+      std::vector<int> failed;
+      for (const EvaluationResult& result : evaluate(makeEvaluator(launcher, slots, 100), std::vector(4, 2.0))) {
+        if (result.ok()) continue;
+        failed.push_back(result.number);
+        EXPECT_THAT(result.measureValues, ElementsAre(kFailedRunValue));
+        EXPECT_THAT(result.failure->lastOutput, ElementsAre("last words"));
+        if (result.number == 1) continue;
+        EXPECT_EQ(failureKindKey(result.failure->kind), "resultsCutOff");
+        EXPECT_EQ(result.failure->reason,
+                  "the last line of simulated.csv has no end, as it has in the first successful run, No. 1: it is cut "
+                  "off");
+      }
+      EXPECT_EQ(failed, failing);
+      EXPECT_EQ(folder_.read(fmt::format("run_Failed{}/simulated.csv", failing.front())),
+                written.at(static_cast<std::size_t>(failing.front() - 1)));
+      EXPECT_THAT(observer_.pairs, testing::UnorderedElementsAreArray(told));
     }
   }
 }

@@ -83,6 +83,7 @@ TEST_F(ModelRunTest, MeasureFileValuesAreTakenByTheirNumber) {
   const std::pair<std::string, std::string> cases[] = {{"7 8.5 # rms and bias", ""},
                                                        {"7\n", file + ": expected at least 2 numbers, found 1"},
                                                        {"7\n8.x\n", file + ":2"},
+                                                       {"7 0,153", file + ":1:3: \"0,153\" may be"},
                                                        {"", file + ": expected at least 2 numbers, found 0"}};
   for (const auto& [content, reason] : cases) {
     writes("out/measures.txt", content);
@@ -90,6 +91,8 @@ TEST_F(ModelRunTest, MeasureFileValuesAreTakenByTheirNumber) {
     EXPECT_EQ(result.ok(), reason.empty()) << content;
     if (result.ok()) {
       EXPECT_THAT(result.measureValues, ElementsAre(8.5));
+      EXPECT_EQ(result.pairs.at(0).file.numberCount, 2U);
+      EXPECT_FALSE(result.pairs.at(0).file.endsLine);
     } else {
       EXPECT_EQ(result.failure->kind, Kind::resultsNotReadable);
       EXPECT_THAT(result.failure->reason, StartsWith(reason));

@@ -289,12 +289,32 @@ void tryRemovedFiles(FaultReport& report) {
   }
 }
 
+/// The model's third run loses the end of what it wrote, as on a full disk, and ends well.
+void tryCutResults(FaultReport& report) {
+  for (const int bytes : {1, 2, 6}) {
+    const TemporaryFolder outside;
+    FaultyRun run(RunSettings{.option = 2, .maxEvaluations = 6},
+                  fmt::format("echo >>{1}/count\n{0} \"$@\" || exit 1\n"
+                              "test -e {1}/armed && test `wc -l <{1}/count` -eq 3 && truncate -s -{2} simulated.csv\n"
+                              "exit 0",
+                              MIREVO_TEST_MODEL, outside.path(), bytes));
+    run.makeReference();
+    fs::remove(outside / "count");
+    outside.write("armed", "");
+    run.reset();
+    const ProgramResult result = run.run({});
+    report.tried("results cut off", fmt::format("{} bytes", bytes),
+                 run.check(result, {.names = {"simulated.csv has no end"}, .mayFailEvaluation = true, .exitCode = 1}));
+  }
+}
+
 }  // namespace
 
 void tryRealFaults(bool isLong, FaultReport& report) {
   tryForbiddenFiles(report);
   tryLimits(isLong, report);
   tryRemovedFiles(report);
+  tryCutResults(report);
   tryDamagedFolders(report);
   tryKeptFolders(isLong, report);
   tryFullDisk(isLong, report);

@@ -142,14 +142,21 @@ TEST_F(Restart, GoesOnThoughAnotherTaskWasRunInBetween) {
 TEST_F(Restart, RunsAreComparedWithTheFirstSuccessfulOneThatWasMadeBefore) {
   folder_.write("model/run.sh",
                 fmt::format("#!/bin/sh\n{} \"$@\"\ngrep -Eq '^a = *5 *$' parameters.txt || exit 0\n"
+                            "grep -Eq '^b = *2 *$' parameters.txt || exec sed -i 102,201d simulated.csv\n"
                             "head -3 simulated.csv >cut && mv cut simulated.csv\n",
                             MIREVO_TEST_MODEL),
                 0755);
   std::vector<std::string> values = scenarios(12);
-  values[5] = "5, 2, 1";  // which would be perfect if it did not end after two days
+  values[5] = "5, 2, 1";      // which would be perfect if it did not end after two days
+  values[7] = "5, 2.001, 1";  // which has no steps for a hundred days
   const std::string fewer = "output measure \"flow\" has 2 pairs, 365 in the first successful run, No. 1";
   const std::string bestIsPoor =
       "The best evaluation, No. 6, is judged by fewer observations than the first successful run: " + fewer;
+  const std::string gap =
+      "simulated.csv has no time step between 2001-04-10 00:00 and 2001-07-20 00:00, 2424 hours; in the first "
+      "successful run, No. 1, steps are at most 24 hours apart";
+  const std::string bestHasGap =
+      "The best evaluation, No. 8, has a longer gap in its simulated steps than the first successful run: " + gap;
   for (const bool mayFail : {false, true}) {
     writeSetup({.option = 0, .scenarios = values, .slots = 3});
     if (mayFail) folder_.editSetup("    Aggregation_Method", "    Minimum_Coverage = 0.5\n    Aggregation_Method");
@@ -163,7 +170,12 @@ TEST_F(Restart, RunsAreComparedWithTheFirstSuccessfulOneThatWasMadeBefore) {
       if (*lastRow == '\0') expected = found;
       EXPECT_EQ(found, expected) << mayFail << lastRow;
       EXPECT_EQ(occurrences(found, "\n6\tFAILED\t"), mayFail ? 1 : 0);
+      EXPECT_EQ(occurrences(found, "\n# Gap: evaluation 8: " + gap + "\n"), 1);
+      EXPECT_EQ(occurrences(log(), "\nWarning: Evaluation of parameter set No. 8: " + gap + "\n"), 1);
       const int named = mayFail ? 0 : 1;
+      for (const std::string& text : {found, log(), program.error, folder_.read("basin_Report.html")}) {
+        EXPECT_EQ(occurrences(text, bestHasGap), 1 - named) << text;
+      }
       EXPECT_EQ(occurrences(found, "\n# Warning: " + bestIsPoor + "\n"), named);
       EXPECT_EQ(occurrences(found, "\n# Fewer pairs: evaluation 6: " + fewer + "\n"), named);
       EXPECT_EQ(occurrences(log(), "\nWarning: " + bestIsPoor + "\n"), named);

@@ -11,6 +11,7 @@
 #include <gtest/gtest.h>
 
 #include "matchers.h"
+#include "measures/observed_series.h"
 #include "platform/series/csv_time_series.h"
 #include "platform/series/memory_time_series.h"
 #include "refusal.h"
@@ -98,6 +99,7 @@ TEST(MeasureStatistics, Exact) {
 
 TEST(MeasureStatistics, UsesTheObservationsThatCount) {
   const DateRecord first{2001, 1, 1};
+  const DateRecord noon{2000, 12, 31, 12};
   const EvaluationPeriod middle{{2001, 1, 2}, {2001, 1, 4}};
   const EvaluationPeriod firstDay{first, {2001, 1, 1, 24, 0}};
   using Values = std::vector<float>;
@@ -108,8 +110,16 @@ TEST(MeasureStatistics, UsesTheObservationsThatCount) {
       {"a period that ends at 24:00", {1, 2, 3}, first, {0, 0, 0}, firstDay, {1, 2}, {0, 1}},
       {"missing observations", {1, 2, 3}, first, {kGap, NAN, 0}, kJanuary, {3}, {2}},
       {"missing simulated values", {1, kGap, 3}, first, {0, 0, 0}, kJanuary, {1, 3}, {0, 2}},
+      {"steps as far apart as may be", {5, 7}, noon, {0, 0, 0}, {first, {2001, 1, 31}, 24.0}, {6}, {0.5}},
+      {"steps too far apart",
+       {5, 7, 9},
+       {2001, 1, 2},
+       {1, 1, 1, 1},
+       {first, {2001, 1, 31}, 23.9},
+       {5, 7, 9},
+       {0, 1, 2}},
       {"a simulation that starts later", {5, 6}, {2001, 1, 2}, {0, 0, 0, 0}, kJanuary, {5, 6}, {0, 1}},
-      {"a simulation that starts in between", {5, 7}, {2000, 12, 31, 12}, {0, 0, 0}, kJanuary, {6}, {0.5}}};
+      {"a simulation that starts in between", {5, 7}, noon, {0, 0, 0}, kJanuary, {6}, {0.5}}};
   for (const auto& [name, simulated, start, observed, period, used, times] : cases) {
     SCOPED_TRACE(name);
     MemoryTimeSeries simulation = daily(simulated, start);
@@ -119,6 +129,15 @@ TEST(MeasureStatistics, UsesTheObservationsThatCount) {
     EXPECT_EQ(s.times, times);
     EXPECT_EQ(s.peakDifference, 0.0F);
   }
+  MemoryTimeSeries simulation = daily({5, 7}, noon);
+  MemoryTimeSeries observation = daily({0, 0});
+  EXPECT_FALSE(hasPairs(measure(), {first, {2001, 1, 31}, 23.9}, simulation, observation)) << "steps too far apart";
+  std::vector<double> values;
+  const ObservedSeries observed = readObservedSeries(0, measure(), kJanuary, SeriesPrecision::exact, observation);
+  appendSimulatedValues(observed, measure(), SeriesPrecision::exact, 24.0 / 24, simulation, values);
+  appendSimulatedValues(observed, measure(), SeriesPrecision::exact, 23.9 / 24, simulation, values);
+  EXPECT_EQ(values.at(0), 6.0);
+  EXPECT_TRUE(std::isnan(values.at(4)));
 }
 
 TEST(MeasureStatistics, AxesThatStartAtDifferentTimesMeetWithoutRounding) {
@@ -194,16 +213,37 @@ TEST(MeasureStatistics, ATextColumnIsRefusedWithItsPlace) {
 
 TEST(MeasureFile, FreeFormat) {
   std::string reason;
-  const auto numbers = parseMeasureFile("m.txt", "# measures\r\n1.5, -2 ;\t3D2\r\n\n.25# the last\n,,7", reason);
-  ASSERT_TRUE(numbers.has_value()) << reason;
-  EXPECT_THAT(*numbers, ElementsAre(1.5, -2.0, 300.0, 0.25, 7.0));
-  EXPECT_THAT(parseMeasureFile("m.txt", "", reason).value(), IsEmpty());
-  EXPECT_FALSE(parseMeasureFile("m.txt", "1 2\n3, NaN\n", reason).has_value());
+  const auto file = parseMeasureFile("m.txt", "# measures\r\n1.5, -2 ;\t3D2\r\n\n.25# the last\n,,7", 1, reason);
+  ASSERT_TRUE(file.has_value()) << reason;
+  EXPECT_THAT(file->numbers, ElementsAre(1.5, -2.0, 300.0, 0.25, 7.0));
+  EXPECT_THAT(parseMeasureFile("m.txt", "", 1, reason).value().numbers, IsEmpty());
+  EXPECT_FALSE(parseMeasureFile("m.txt", "1 2\n3, NaN\n", 1, reason).has_value());
   EXPECT_EQ(reason, "m.txt:2:4: expected a number, found \"NaN\"");
-  EXPECT_FALSE(parseMeasureFile("m.txt", "\xFF\xFE", reason).has_value());
+  EXPECT_FALSE(parseMeasureFile("m.txt", "\xFF\xFE", 1, reason).has_value());
   EXPECT_THAT(reason, HasSubstr("; the file is UTF-16 text; save it as UTF-8"));
-  EXPECT_FALSE(readMeasureFile("no_such_folder/m.txt", reason).has_value());
+  EXPECT_FALSE(readMeasureFile("no_such_folder/m.txt", 1, reason).has_value());
   EXPECT_EQ(reason, "no_such_folder/m.txt: No such file or directory");
+}
+
+TEST(MeasureFile, ACommaThatMayBeADecimalOneIsRefused) {
+  // content, numbers that are needed, numbers read; none: refused
+  const std::tuple<const char*, std::size_t, std::size_t> cases[] = {
+      {"0,153", 1, 0},  {"# a,b\n7;-0,2D1,\n", 2, 0},
+      {"0,153", 2, 2},  {"0, 153", 1, 2},
+      {"1,2,3", 1, 3},  {"0,5 1.5", 1, 3},
+      {"2,3\n4", 2, 0}, {"1,-2", 1, 2},
+      {"1,,2", 1, 2},
+  };
+  for (const auto& [content, needed, count] : cases) {
+    std::string reason;
+    const auto file = parseMeasureFile("m.txt", content, needed, reason);
+    EXPECT_EQ(file ? file->numbers.size() : 0, count) << content << reason;
+  }
+  std::string reason;
+  parseMeasureFile("m.txt", "7 8\n 0,153", 1, reason);
+  EXPECT_EQ(reason,
+            "m.txt:2:2: \"0,153\" may be one number with a decimal comma or two: a decimal point, or a blank behind a "
+            "comma that separates, tells");
 }
 
 }  // namespace

@@ -38,6 +38,8 @@ TEST(PeriodSeries, ValuesBetweenStepsAreLinearAndNeverBesideAMissingOne) {
   const auto nan = NanSensitiveFloatEq(NAN);
   const std::vector<std::int64_t> seconds{9, 10, 15, 20, 25, 30, 35, 40, 41};
   EXPECT_THAT(valuesAt(series, seconds), ElementsAre(nan, 1.0F, 1.5F, 2.0F, nan, nan, nan, 4.0F, nan));
+  EXPECT_THAT(valuesAt(series, seconds, 10 / 86400.0), ElementsAre(nan, 1.0F, 1.5F, 2.0F, nan, nan, nan, 4.0F, nan));
+  EXPECT_THAT(valuesAt(series, seconds, 9.9 / 86400.0), ElementsAre(nan, 1.0F, nan, 2.0F, nan, nan, nan, 4.0F, nan));
 }
 
 }  // namespace

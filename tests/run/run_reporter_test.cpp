@@ -95,43 +95,64 @@ TEST_F(RunReporterTest, AggregatesUnknownOnArrivalAreFilledInWhenTheTransformati
   }
 }
 
-TEST_F(RunReporterTest, EvaluationsThatMeetFewerObservationsThanTheFirstSuccessfulRunAreNamed) {
-  const MeasurePairs first{0, 48, 0, 86400, 2 * 86400, {0.1, 0.5, 1.0}, {-1.0, 1.0 / 3.0, 2.0}};
+TEST_F(RunReporterTest, EvaluationsThatDifferFromTheFirstSuccessfulRunAreNamed) {
+  const FileForm form{.endsLine = false, .stepCount = 48, .gapStart = 86400, .gapEnd = 90000};
+  const MeasurePairs first{0, 48, 0, 86400, 2 * 86400, {0.1, 0.5, 1.0}, {-1.0, 1.0 / 3.0, 2.0}, form};
+  MeasurePairs numbers;
+  numbers.measure = 1;
+  numbers.file.numberCount = 3;
   MeasurePairs two = first;
   two.count = 2;
   two.missingCount = 46;
-  const auto arrive = [this](int number, double objective, const MeasurePairs& pairs) {
-    report({.number = number, .objectiveValues = {objective}, .aggregate = objective, .pairs = {pairs}});
+  const auto arrive = [this, &numbers](int number, double objective, const MeasurePairs& pairs) {
+    report({.number = number, .objectiveValues = {objective}, .aggregate = objective, .pairs = {pairs, numbers}});
   };
   arrive(3, 5.0, first);  // before it is known which run is the first successful one
   arrive(1, 6.0, first);
   EXPECT_THAT(reporter_.numbersWithPairs(), testing::IsEmpty());
-  reporter_.pairsFound({1, {"as many as 48"}, {}});
-  EXPECT_EQ(reporter_.fewerPairsOfBest() + reporter_.fewerPairsWarning(), "");
+  using Kind = RunDifference::Kind;
+  reporter_.runCompared({1, {"as many as 48"}, {}, {}, {}});
+  EXPECT_THAT(reporter_.differencesOfBest(), testing::IsEmpty());
+  EXPECT_THAT(reporter_.differenceWarnings(), testing::IsEmpty());
   for (int number = 4; number < 26; ++number) {
     arrive(number, number == 7 ? 1.0 : 2.0, two);
-    reporter_.pairsFound({0, {}, {{number, 0, 2, 48, "2 of 48", number == 8}, {number, 1, 3, 9, "3 of 9"}}});
+    reporter_.runCompared({.differences = {{number, 0, Kind::fewerPairs, "2 of 48", number == 8},
+                                           {number, 0, Kind::gap, "a day", false},
+                                           {number, 1, Kind::fewerPairs, "3 of 9", false}}});
   }
-  reporter_.pairsFound({.others = {26}});
+  reporter_.runCompared({.differences = {{7, 1, Kind::otherCount, "3 numbers", false}}});
+  reporter_.runCompared({.others = {26}});
   EXPECT_EQ(reporter_.numbersWithPairs().size(), 24U);  // with those of the first successful run, and of others
-  EXPECT_EQ(
-      reporter_.fewerPairsOfBest(),
-      "The best evaluation, No. 7, is judged by fewer observations than the first successful run: 2 of 48; 3 of 9");
-  const std::vector<std::string> lines = reporter_.fewerPairsLines();
-  ASSERT_EQ(lines.size(), 21U);
+  EXPECT_THAT(
+      reporter_.differencesOfBest(),
+      testing::ElementsAre(
+          "The best evaluation, No. 7, is judged by fewer observations than the first successful run: 2 of 48; 3 of 9",
+          "The best evaluation, No. 7, has a longer gap in its simulated steps than the first successful run: a day",
+          "The best evaluation, No. 7, has another count of numbers than the first successful run: 3 numbers"));
+  EXPECT_THAT(
+      reporter_.differenceWarnings(),
+      testing::ElementsAre("22 evaluations are judged by fewer observations than the first successful run: the end of "
+                           "s.dat names the first of them",
+                           "22 evaluations have a longer gap in their simulated steps than the first successful run: "
+                           "the end of s.dat names the first of them",
+                           "1 evaluation has another count of numbers than the first successful run: the end of s.dat "
+                           "names it"));
+  const std::vector<std::string> lines = reporter_.differenceLines();
+  ASSERT_EQ(lines.size(), 43U);
   EXPECT_EQ(lines.front(), "Fewer pairs: evaluation 4: 2 of 48; 3 of 9");
-  EXPECT_EQ(lines.back(), "Fewer pairs: 2 more evaluations, see s_Pairs.dat");
-  EXPECT_EQ(reporter_.fewerPairsWarning(),
-            "22 evaluations are judged by fewer observations than the first successful run: the end of s.dat names the "
-            "first of them");
-  EXPECT_THAT(folder_.read("s.log"),
-              AllOf(HasSubstr("as many as 48\n"), HasSubstr("   Evaluation of parameter set No. 7: 2 of 48\n"),
-                    Not(HasSubstr("No. 8: 2 of 48"))));
+  EXPECT_EQ(lines[20], "Fewer pairs: 2 more evaluations, see s_Pairs.dat");
+  EXPECT_EQ(lines[21], "Gap: evaluation 4: a day");
+  EXPECT_EQ(lines.back(), "Count of numbers: evaluation 7: 3 numbers");
+  EXPECT_THAT(
+      folder_.read("s.log"),
+      AllOf(HasSubstr("as many as 48\n"), HasSubstr("   Evaluation of parameter set No. 7: 2 of 48\n"),
+            Not(HasSubstr("No. 8: 2 of 48")), HasSubstr("\nWarning: Evaluation of parameter set No. 23: a day\n"),
+            HasSubstr("\n   Evaluation of parameter set No. 24: a day\n")));
 
-  EXPECT_EQ(pairs_.readEarlier({3, 7, 30}), (PairsByNumber{{3, {first}}, {7, {two}}}));
+  EXPECT_EQ(pairs_.readEarlier({3, 7, 30}), (PairsByNumber{{3, {first, numbers}}, {7, {two, numbers}}}));
   std::string reason;
   EXPECT_TRUE(pairs_.finish(reporter_.numbersWithPairs(), reason)) << reason;
-  EXPECT_EQ(pairs_.readEarlier({1, 3, 7}), (PairsByNumber{{1, {first}}, {7, {two}}}));
+  EXPECT_EQ(pairs_.readEarlier({1, 3, 7}), (PairsByNumber{{1, {first, numbers}}, {7, {two, numbers}}}));
 }
 
 TEST_F(RunReporterTest, AnEvaluationReachesResultFileLogProgressAndTheFileOfFailures) {

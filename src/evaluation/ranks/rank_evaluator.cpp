@@ -25,7 +25,7 @@ RankEvaluator::RankEvaluator(ModelRunner& runner, Job& job, EvaluationObserver& 
     : runner_(runner),
       job_(job),
       observer_(observer),
-      ledger_(observer, failedRuns, earlier, runner.equalMeasures(), runner.pairComparison()),
+      ledger_(observer, failedRuns, earlier, runner.equalMeasures(), runner.runComparison()),
       workers_(static_cast<std::size_t>(job.processCount() - 1)) {}
 
 std::vector<EvaluationResult> RankEvaluator::evaluateParameterSets(std::span<const ParameterSet> sets,
@@ -35,6 +35,7 @@ std::vector<EvaluationResult> RankEvaluator::evaluateParameterSets(std::span<con
   while (!ledger_.isComplete()) {
     const auto message = job_.receive(kMasterPollSeconds);
     if (message) handle(*message);
+    finishAnswered();
     stopIfCancelled();
     startOnFreeWorkers();
   }
@@ -53,7 +54,7 @@ void RankEvaluator::startNext(int rank) {
     auto failure = runner_.findUnrunnable(ledger_.set(*place));
     if (!failure) {
       job_.send(rank, static_cast<int>(RankMessage::set),
-                encode(SetMessage{ledger_.numberOf(*place), ledger_.set(*place), ledger_.requiredPairs()}));
+                encode(SetMessage{ledger_.numberOf(*place), ledger_.set(*place), ledger_.standard()}));
       worker(rank).set = *place;
       ledger_.markInitiated(*place);
       return;
@@ -83,7 +84,26 @@ void RankEvaluator::handle(const Message& message) {
 }
 
 void RankEvaluator::takeResult(int rank, ResultMessage message) {
-  const std::size_t place = takeSetOf(rank);
+  requireSet(rank);
+  worker(rank).answer = std::move(message);
+}
+
+void RankEvaluator::finishAnswered() {
+  int rank = 1;
+  while (rank < job_.processCount()) {
+    Worker& answered = worker(rank);
+    if (answered.answer && ledger_.judge(*answered.set, answered.answer->result)) {
+      finish(answered, rank);
+      rank = 1;  // others may have waited for this one
+    } else {
+      ++rank;
+    }
+  }
+}
+
+void RankEvaluator::finish(Worker& worker, int rank) {
+  const std::size_t place = *std::exchange(worker.set, std::nullopt);
+  ResultMessage message = *std::exchange(worker.answer, std::nullopt);
   EvaluationResult& result = message.result;
   // Only the master knows the transformation determined from the initial sample.
   if (result.ok()) result.aggregate = runner_.aggregator().aggregate(result.objectiveValues);
@@ -93,16 +113,14 @@ void RankEvaluator::takeResult(int rank, ResultMessage message) {
   ledger_.finish(place, std::move(result), message.leftBehind);
 }
 
-std::size_t RankEvaluator::takeSetOf(int rank) {
-  const auto place = std::exchange(worker(rank).set, std::nullopt);
-  if (!place) {
-    fatalError(kCommunicationFailed, fmt::format("the worker with rank {} sent a result that nobody asked for", rank));
-  }
-  return *place;
+void RankEvaluator::requireSet(int rank) {
+  if (worker(rank).set && !worker(rank).answer) return;
+  fatalError(kCommunicationFailed, fmt::format("the worker with rank {} sent a result that nobody asked for", rank));
 }
 
 void RankEvaluator::giveUp(int rank, const GivenUpMessage& message) {
-  ledger_.putBack(takeSetOf(rank));
+  requireSet(rank);
+  ledger_.putBack(*std::exchange(worker(rank).set, std::nullopt));
   worker(rank).isGivenUp = true;
   for (const std::string& text : message.warnings) observer_.warning(text);
   const FolderDamage damage{message.what, fmt::format("{}; reported by {}", message.why, nameOf(rank))};
@@ -110,6 +128,15 @@ void RankEvaluator::giveUp(int rank, const GivenUpMessage& message) {
     failWithoutSlots(damage);
   }
   observer_.warning(givenUpWarning(fmt::format("Worker {}", rank), damage));
+  freeOneThatWaits();
+}
+
+void RankEvaluator::freeOneThatWaits() {
+  const auto isBound = [](const Worker& each) { return each.isGivenUp || each.answer; };
+  if (!std::all_of(workers_.begin(), workers_.end(), isBound)) return;
+  const auto waiting = std::find_if(workers_.begin(), workers_.end(), [](const Worker& each) { return each.answer; });
+  waiting->answer.reset();
+  ledger_.putBack(*std::exchange(waiting->set, std::nullopt));
 }
 
 std::string RankEvaluator::nameOf(int rank) const {

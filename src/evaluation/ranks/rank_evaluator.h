@@ -29,9 +29,10 @@ class RankEvaluator final : public Evaluator {
 
  private:
   struct Worker {
-    std::optional<ReadyMessage> place;  ///< host and process folder; empty until it is ready
-    std::optional<std::size_t> set;     ///< index in the batch of the set that it runs
-    bool isGivenUp = false;             ///< its process folder cannot be used any more
+    std::optional<ReadyMessage> place;    ///< host and process folder; empty until it is ready
+    std::optional<std::size_t> set;       ///< index in the batch of the set that it runs
+    std::optional<ResultMessage> answer;  ///< waits for the first successful run, see EvaluationLedger::judge()
+    bool isGivenUp = false;               ///< its process folder cannot be used any more
   };
 
   void startOnFreeWorkers();
@@ -39,10 +40,16 @@ class RankEvaluator final : public Evaluator {
   void startNext(int rank);
   void handle(const Message& message);
   void takeResult(int rank, ResultMessage message);
+  /// Throws FatalError if the worker was given no set, or has sent its result.
+  void requireSet(int rank);
+  /// Finishes the answers that can be judged.
+  void finishAnswered();
+  void finish(Worker& worker, int rank);
   /// Throws FatalError if it was the last one.
   void giveUp(int rank, const GivenUpMessage& message);
-  /// The set that the worker was given, which it then has no longer.
-  std::size_t takeSetOf(int rank);
+  /// If no worker is left for the set that another has given back, as all answers wait for its run: makes one of them
+  /// run it, and its own set again after it.
+  void freeOneThatWaits();
   std::string nameOf(int rank) const;
   [[noreturn]] void failWith(int rank, const FailureMessage& failure) const;
   void stopIfCancelled();

@@ -22,7 +22,7 @@ struct Layout<BeginMessage> {
 };
 template <>
 struct Layout<SetMessage> {
-  static void of(auto& archive, auto& message) { archive(message.number, message.set, message.requiredPairs); }
+  static void of(auto& archive, auto& message) { archive(message.number, message.set, message.standard); }
 };
 template <>
 struct Layout<ReadyMessage> {
@@ -49,20 +49,27 @@ template <>
 struct Layout<EvaluationResult> {
   static void of(auto& archive, auto& result) {
     archive(result.measureValues, result.objectiveValues, result.aggregate, result.exactMeasures,
-            result.simulatedValues, result.failure, result.unusedObservations, result.pairs, result.warnings,
-            result.shownSeries);
+            result.simulatedValues, result.failure, result.unusedObservations, result.pairs, result.lastOutput,
+            result.warnings, result.shownSeries);
   }
 };
 template <>
-struct Layout<RequiredPairs> {
-  static void of(auto& archive, auto& required) {
-    archive(required.anyHasSucceeded, required.firstNumber, required.firstCounts);
+struct Layout<RunStandard> {
+  static void of(auto& archive, auto& standard) {
+    archive(standard.anyHasSucceeded, standard.firstNumber, standard.firstCounts, standard.withoutLineEnds);
   }
 };
 template <>
 struct Layout<MeasurePairs> {
   static void of(auto& archive, auto& pairs) {
-    archive(pairs.measure, pairs.count, pairs.missingCount, pairs.first, pairs.last, pairs.observed, pairs.simulated);
+    archive(pairs.measure, pairs.count, pairs.missingCount, pairs.first, pairs.last, pairs.observed, pairs.simulated,
+            pairs.file);
+  }
+};
+template <>
+struct Layout<FileForm> {
+  static void of(auto& archive, auto& file) {
+    archive(file.endsLine, file.numberCount, file.stepCount, file.gapStart, file.gapEnd);
   }
 };
 template <>

@@ -6,7 +6,7 @@
 
 #include "common/parameter_set.h"
 #include "evaluation/evaluation_result.h"
-#include "evaluation/pair_comparison.h"
+#include "evaluation/run_comparison.h"
 
 namespace mirevo {
 
@@ -42,7 +42,7 @@ struct ReadyMessage {
 struct SetMessage {
   int number = 0;  ///< number of the evaluation in the run, from 1
   ParameterSet set;
-  RequiredPairs requiredPairs;
+  RunStandard standard;
 };
 
 struct ResultMessage {

@@ -41,7 +41,7 @@ bool isExecuting(ModelRunner& runner) {
 
 /// Runs the model with one set; empty when the master sends stop in the meantime.
 std::optional<ResultMessage> runModel(Job& job, ModelRunner& runner, const SetMessage& message) {
-  runner.requirePairs(message.requiredPairs);
+  runner.setStandard(message.standard);
   if (auto failure = runner.prepareModelRun(message.set, kSlot))
     return ResultMessage{runner.failedResult(*failure), {}};
   while (isExecuting(runner)) {

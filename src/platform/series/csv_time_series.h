@@ -6,6 +6,7 @@
 #include <string_view>
 #include <vector>
 
+#include "common/text.h"
 #include "platform/series/stored_time_series.h"
 
 namespace mirevo {
@@ -25,6 +26,7 @@ class CsvTimeSeries final : public StoredTimeSeries {
 
   /// The value of the `# missing =` comment, else NaN. Empty cells, NaN and NA become NaN.
   std::optional<float> deleteValue() const override { return deleteValue_; }
+  bool endsLine() const override { return mirevo::endsLine(content_); }
   /// A time of day in a column of its own, which would be the first item.
   std::string doubt() const override;
 

@@ -56,7 +56,7 @@ std::size_t firstStepFrom(std::span<const double> times, double days, std::size_
 
 template <typename Value>
 std::optional<Value> interpolate(std::span<const double> times, std::span<const Value> values,
-                                 std::optional<float> deleteValue, double days, std::size_t& hint) {
+                                 std::optional<float> deleteValue, double days, double largestGap, std::size_t& hint) {
   const std::size_t next = firstStepFrom(times, days, hint);
   hint = next;
   if (next >= std::min(times.size(), values.size())) return std::nullopt;
@@ -64,8 +64,10 @@ std::optional<Value> interpolate(std::span<const double> times, std::span<const 
   if (isMissing(nextValue, deleteValue)) return std::nullopt;
   if (times[next] <= days + kSameTimeDays) return nextValue;
   if (next == 0 || isMissing(values[next - 1], deleteValue)) return std::nullopt;
+  const double gap = times[next] - times[next - 1];
+  if (gap > largestGap + kSameTimeDays) return std::nullopt;
   const double before = values[next - 1];
-  const double fraction = (days - times[next - 1]) / (times[next] - times[next - 1]);
+  const double fraction = (days - times[next - 1]) / gap;
   return static_cast<Value>(before + fraction * (static_cast<double>(nextValue) - before));
 }
 
@@ -99,13 +101,14 @@ std::unique_ptr<TimeSeriesObject> createTimeSeriesObject(const std::string& file
   return nullptr;
 }
 
-std::optional<float> valueAt(const TimeSeriesObject& series, int item, double days, std::size_t& hint) {
-  return interpolate(series.times(), series.values(item), series.deleteValue(), days, hint);
+std::optional<float> valueAt(const TimeSeriesObject& series, int item, double days, std::size_t& hint,
+                             double largestGap) {
+  return interpolate(series.times(), series.values(item), series.deleteValue(), days, largestGap, hint);
 }
 
 std::optional<double> exactValueAt(std::span<const double> times, std::span<const double> values, double days,
-                                   std::size_t& hint) {
-  return interpolate(times, values, std::nullopt, days, hint);
+                                   std::size_t& hint, double largestGap) {
+  return interpolate(times, values, std::nullopt, days, largestGap, hint);
 }
 
 std::optional<float> valueAt(const TimeSeriesObject& series, int item, double days) {

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <limits>
 #include <memory>
 #include <optional>
 #include <span>
@@ -28,6 +29,9 @@ class TimeSeriesObject {
   /// Date and time of the first step; empty if the file has no steps.
   virtual std::optional<DateRecord> startTime() const = 0;
   virtual std::optional<float> deleteValue() const = 0;
+  /// Whether the last line of the file has an end, as lines that were not cut off have; true for a format without
+  /// lines.
+  virtual bool endsLine() const { return true; }
   virtual int itemCount() const = 0;
   virtual std::string itemName(int item) const = 0;
   /// What in the open file seems to be meant in another way than it is read, for a warning; empty if nothing.
@@ -56,6 +60,9 @@ std::unique_ptr<TimeSeriesObject> createTimeSeriesObject(const std::string& file
 /// bits over thousands of years and far below any time step.
 inline constexpr double kSameTimeDays = 0.5e-3 / 86400.0;
 
+/// The largest gap, in days, of a series that is interpolated between any two steps.
+inline constexpr double kAnyGap = std::numeric_limits<double>::infinity();
+
 /// Whether a value marks a gap: the delete value, or NaN.
 template <typename Value>
 bool isMissing(Value value, std::optional<float> deleteValue) {
@@ -63,15 +70,17 @@ bool isMissing(Value value, std::optional<float> deleteValue) {
 }
 
 /// The value at a time (days since the start of the series): that of a step at this time, else interpolated linearly
-/// between its two neighbours, in 64 bits and rounded once to 32; empty outside the time axis or next to a missing
-/// value. getData() must have been called. `hint` is the 0-based step near which the search begins, and is set to where
-/// it ends: callers that proceed along the axis pass the same variable again and find each value in constant time.
-std::optional<float> valueAt(const TimeSeriesObject& series, int item, double days, std::size_t& hint);
+/// between its two neighbours, in 64 bits and rounded once to 32; empty outside the time axis, next to a missing value,
+/// and between two steps that are farther apart than `largestGap`. getData() must have been called. `hint` is the
+/// 0-based step near which the search begins, and is set to where it ends: callers that proceed along the axis pass the
+/// same variable again and find each value in constant time.
+std::optional<float> valueAt(const TimeSeriesObject& series, int item, double days, std::size_t& hint,
+                             double largestGap = kAnyGap);
 std::optional<float> valueAt(const TimeSeriesObject& series, int item, double days);
 
 /// The same in 64 bits for a series of `times` and `values`, in which NaN is missing.
 std::optional<double> exactValueAt(std::span<const double> times, std::span<const double> values, double days,
-                                   std::size_t& hint);
+                                   std::size_t& hint, double largestGap = kAnyGap);
 
 /// Largest and smallest value that is not missing with start <= t <= end; empty when there is none.
 std::optional<float> extractMaxValue(const TimeSeriesObject& series, int item, double start, double end);

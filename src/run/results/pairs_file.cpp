@@ -1,5 +1,6 @@
 #include "run/results/pairs_file.h"
 
+#include <cmath>
 #include <cstddef>
 #include <cstdint>
 #include <optional>
@@ -18,17 +19,29 @@ namespace {
 const std::vector<std::string>& columns() {
   static const std::vector<std::string> kColumns{
       "Evaluation",    "Measure",      "Pairs",           "Missing",        "First",         "Last",
-      "LeastObserved", "MeanObserved", "LargestObserved", "LeastSimulated", "MeanSimulated", "LargestSimulated"};
+      "LeastObserved", "MeanObserved", "LargestObserved", "LeastSimulated", "MeanSimulated", "LargestSimulated",
+      "LineEnd",       "Numbers",      "Steps",           "GapStart",       "GapEnd"};
   return kColumns;
+}
+
+std::string timeCell(std::int64_t second, bool isKnown) {
+  return isKnown ? isoTime(second) : std::string();
 }
 
 std::string rowsOf(int number, std::span<const MeasurePairs> pairs) {
   std::string text;
   for (const MeasurePairs& of : pairs) {
+    const bool hasPairs = of.count > 0;
+    const bool hasGap = of.file.gapEnd > of.file.gapStart;
+    const auto valueCell = [hasPairs](double value) { return hasPairs ? value : std::nan(""); };
     text += dataTableRow({std::int64_t{number}, static_cast<std::int64_t>(of.measure) + 1,
                           static_cast<std::int64_t>(of.count), static_cast<std::int64_t>(of.missingCount),
-                          isoTime(of.first), isoTime(of.last), of.observed.least, of.observed.mean, of.observed.largest,
-                          of.simulated.least, of.simulated.mean, of.simulated.largest});
+                          timeCell(of.first, hasPairs), timeCell(of.last, hasPairs), valueCell(of.observed.least),
+                          valueCell(of.observed.mean), valueCell(of.observed.largest), valueCell(of.simulated.least),
+                          valueCell(of.simulated.mean), valueCell(of.simulated.largest),
+                          std::int64_t{of.file.endsLine ? 1 : 0}, static_cast<std::int64_t>(of.file.numberCount),
+                          static_cast<std::int64_t>(of.file.stepCount), timeCell(of.file.gapStart, hasGap),
+                          timeCell(of.file.gapEnd, hasGap)});
   }
   return text;
 }
@@ -47,6 +60,40 @@ std::optional<ValueSummary> summaryOf(std::span<const std::string> cells) {
   return ValueSummary{*least, *mean, *largest};
 }
 
+std::optional<FileForm> formOf(std::span<const std::string> cells) {
+  const auto ends = countOf(cells[0], 0);
+  const auto numbers = countOf(cells[1], 0);
+  const auto steps = countOf(cells[2], 0);
+  if (!ends || *ends > 1 || !numbers || !steps) return std::nullopt;
+  FileForm form{.endsLine = *ends == 1, .numberCount = *numbers, .stepCount = *steps};
+  if (cells[3].empty() && cells[4].empty()) return form;
+  const auto start = readIsoTime(cells[3]);
+  const auto end = readIsoTime(cells[4]);
+  if (!start || !end || *end <= *start) return std::nullopt;
+  form.gapStart = *start;
+  form.gapEnd = *end;
+  return form;
+}
+
+std::optional<MeasurePairs> pairsOf(std::span<const std::string> cells) {
+  const auto measure = countOf(cells[1], 1);
+  const auto count = countOf(cells[2], 0);
+  const auto missing = countOf(cells[3], 0);
+  const auto form = formOf(cells.subspan(12, 5));
+  if (!measure || !count || !missing || !form) return std::nullopt;
+  MeasurePairs pairs;
+  pairs.measure = *measure - 1;
+  pairs.missingCount = *missing;
+  pairs.file = *form;
+  if (*count == 0) return pairs;
+  const auto first = readIsoTime(cells[4]);
+  const auto last = readIsoTime(cells[5]);
+  const auto observed = summaryOf(cells.subspan(6, 3));
+  const auto simulated = summaryOf(cells.subspan(9, 3));
+  if (!first || !last || !observed || !simulated) return std::nullopt;
+  return MeasurePairs{*measure - 1, *count, *missing, *first, *last, *observed, *simulated, *form};
+}
+
 }  // namespace
 
 PairsByNumber readPairsTable(std::string_view text) {
@@ -55,20 +102,20 @@ PairsByNumber readPairsTable(std::string_view text) {
   if (table.columns != columns()) return read;
   for (const std::vector<std::string>& cells : table.rows) {
     const auto number = parseInteger(cells[0]);
-    const auto measure = countOf(cells[1], 1);
-    const auto count = countOf(cells[2], 1);
-    const auto missing = countOf(cells[3], 0);
-    const auto first = readIsoTime(cells[4]);
-    const auto last = readIsoTime(cells[5]);
-    const auto observed = summaryOf(std::span(cells).subspan(6, 3));
-    const auto simulated = summaryOf(std::span(cells).subspan(9, 3));
-    if (!number || !measure || !count || !missing || !first || !last || !observed || !simulated) continue;
+    const auto found = pairsOf(cells);
+    if (!number || !found) continue;
     // A row that was written again, as its evaluation had to be repeated, replaces the first.
     std::vector<MeasurePairs>& pairs = read[*number];
-    std::erase_if(pairs, [&measure](const MeasurePairs& other) { return other.measure + 1 == *measure; });
-    pairs.push_back({*measure - 1, *count, *missing, *first, *last, *observed, *simulated});
+    std::erase_if(pairs, [&found](const MeasurePairs& other) { return other.measure == found->measure; });
+    pairs.push_back(*found);
   }
   return read;
+}
+
+std::string pairsTableText(std::span<const std::string> head, const PairsByNumber& pairs) {
+  std::string text = dataTableHead({{}, {head.begin(), head.end()}, columns(), {}});
+  for (const auto& [number, of] : pairs) text += rowsOf(number, of);
+  return text;
 }
 
 PairsFile::PairsFile(std::string path, std::vector<std::string> tableHead)
@@ -84,8 +131,7 @@ void PairsFile::continueBehind(PairsByNumber earlier) {
   const auto present = readFileIfThere(path_);
   if (earlier.empty() && !present) return;
   pairs_ = std::move(earlier);
-  std::string text = dataTableHead({{}, tableHead_, columns(), {}});
-  for (const auto& [number, pairs] : pairs_) text += rowsOf(number, pairs);
+  const std::string text = pairsTableText(tableHead_, pairs_);
   std::string reason;
   if (present != text && !replaceFile(path_, text, reason)) fatalError("Error: Unable to write to " + path_, reason);
   file_.openToContinue(path_);
@@ -105,10 +151,8 @@ bool PairsFile::finish(const std::set<int>& numbers, std::string& reason) {
   if (!file_.isOpen()) return true;
   if (!file_.tryClose(reason)) return false;
   if (numbers.empty()) return true;
-  std::string text = dataTableHead({{}, tableHead_, columns(), {}});
-  for (const auto& [number, pairs] : pairs_) {
-    if (numbers.count(number) > 0) text += rowsOf(number, pairs);
-  }
+  std::erase_if(pairs_, [&numbers](const auto& entry) { return numbers.count(entry.first) == 0; });
+  const std::string text = pairsTableText(tableHead_, pairs_);
   std::string ignored;
   return readTextFile(path_, ignored) == text || replaceFile(path_, text, reason);
 }

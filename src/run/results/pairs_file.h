@@ -15,7 +15,7 @@ namespace mirevo {
 /// Pairs by the number of their evaluation.
 using PairsByNumber = std::map<int, std::vector<MeasurePairs>>;
 
-/// The pairs of the first successful run and of the runs that have fewer, `<setup>_Pairs.dat` and its like: for
+/// The pairs and files of the first successful run and of the runs that differ, `<setup>_Pairs.dat` and its like: for
 /// programs, and for a restart, which compares further runs with the first successful one. The file appears with the
 /// first pairs.
 class PairsFile final {
@@ -45,5 +45,7 @@ class PairsFile final {
 
 /// The rows of the table's text. Any text is taken; what is no row is left out.
 PairsByNumber readPairsTable(std::string_view text);
+/// The whole table, below `head` for people.
+std::string pairsTableText(std::span<const std::string> head, const PairsByNumber& pairs);
 
 }  // namespace mirevo

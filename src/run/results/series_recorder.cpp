@@ -236,8 +236,8 @@ ShownSeries SeriesRecorder::shownSeries(std::size_t pair) const {
     while (i < shown.seconds.size() && shown.seconds[i] < observed.seconds[k]) ++i;
     if (i < shown.seconds.size() && shown.seconds[i] == observed.seconds[k]) shown.observed[i] = observed.values[k];
   }
-  shown.initial = valuesAt(initial, shown.seconds);
-  shown.best = valuesAt(best, shown.seconds);
+  shown.initial = valuesAt(initial, shown.seconds, run_.largestGap);
+  shown.best = valuesAt(best, shown.seconds, run_.largestGap);
   return shown;
 }
 

@@ -32,6 +32,7 @@ struct RecordedSeries {
   std::vector<PeriodSeries> observations;  ///< with one step before and after the period
   std::int64_t periodFirst = 0;            ///< secondNumber() of the ends of the period
   std::int64_t periodLast = 0;
+  double largestGap = kAnyGap;        ///< days between two simulated steps over which is interpolated
   std::vector<double> initialValues;  ///< initial values of the variable parameters, model scale
   std::vector<KeptSeries> kept = {};  ///< of the pairs, for a task that keeps the simulated values of all evaluations
 };

@@ -204,7 +204,16 @@ const SettingSection<RunConfig>& judgementSection() {
              .meaning =
                  "Least share, of the pairs of simulated and observed values that the first successful run has of a "
                  "measure, with which a model run counts; with a smaller share it is a failed run. 0: no run "
-                 "fails for lack of pairs, as long as it has any."})}}};
+                 "fails for lack of pairs, as long as it has any."}),
+        setting<RunConfig>([](auto& c) -> auto& { return c.period.largestGapHours; },
+                           {.name = "Largest_Gap",
+                            .defaultValue = "0.0",
+                            .range = kNonNegative,
+                            .refusal = "Error: Largest gap invalid",
+                            .unit = "h",
+                            .meaning = "Longest time between two simulated steps over which is interpolated; an "
+                                       "observation in a longer gap has no simulated value. 0: interpolated over any "
+                                       "gap."})}}};
   return section;
 }
 

@@ -92,10 +92,27 @@ TEST_F(RankEvaluatorTest, WorkersWaitForTheFirstSuccessfulRunWhosePairsTheirsNee
   evaluate(master, {2.0, 4.0, 6.0});
   std::vector<std::pair<int, std::vector<std::size_t>>> required;
   for (const Message& message : job_.sent) {
-    required.emplace_back(message.rank, decodeSet(message.content).requiredPairs.firstCounts);
+    required.emplace_back(message.rank, decodeSet(message.content).standard.firstCounts);
   }
   EXPECT_THAT(required, ElementsAre(testing::Pair(1, IsEmpty()), testing::Pair(1, ElementsAre(5)),
                                     testing::Pair(2, ElementsAre(5))));
+}
+
+TEST_F(RankEvaluatorTest, AFileWithoutALineEndWaitsForTheFirstSuccessfulRun) {
+  RankEvaluator& master = makeMaster();
+  becomeReady(1);
+  becomeReady(2);
+  job_.onReceive = [this](double) {
+    if (!job_.arriving.empty() || running_.empty()) return;
+    const int last = running_.rbegin()->first;
+    pairs_ = {{.count = 5}};
+    pairs_[0].file.endsLine = running_.at(last) == 2.0;  // the first successful run's, which ends last
+    answer(last);
+  };
+  const auto results = evaluate(master, {2.0, 4.0, 6.0});
+  EXPECT_THAT(measuresOf(results), ElementsAre(1.0, kFailedRunValue, kFailedRunValue));
+  EXPECT_EQ(job_.sent.at(2).rank, 1) << "the other one waits with its folder";
+  EXPECT_EQ(decodeSet(job_.sent.at(2).content).standard.firstNumber, 1);
 }
 
 TEST_F(RankEvaluatorTest, FailedRunsOfAllWorkersCountTogether) {
@@ -187,6 +204,24 @@ TEST_F(RankEvaluatorTest, TheSetOfAWorkerThatIsGivenUpIsAnothersUntilNoneIsLeft)
   EXPECT_THAT(refusalOf([&] { evaluate(master, {5.5}); }),
               StartsWith("Error: Unable to open x\nno such file; reported by worker 2 on node\nno process folder is "
                          "left"));
+}
+
+TEST_F(RankEvaluatorTest, AWorkerThatWaitsRunsTheSetThatTheLastOtherHasGivenBack) {
+  RankEvaluator& master = makeMaster();
+  becomeReady(1);
+  becomeReady(2);
+  job_.onReceive = [this](double) {
+    if (!job_.arriving.empty()) return;
+    observer_.cancelled = running_.empty();  // or it would wait for ever
+    if (observer_.cancelled) return;
+    const int last = running_.rbegin()->first;
+    pairs_ = {{.count = 5}};
+    pairs_[0].file.endsLine = running_.at(last) == 2.0;
+    if (last == 2) return answer(last);
+    running_.erase(last);
+    job_.deliver(1, RankMessage::givenUp, encode(GivenUpMessage{"Unable to open x", "no such file", {}}));
+  };
+  EXPECT_THAT(measuresOf(evaluate(master, {2.0, 4.0})), ElementsAre(1.0, kFailedRunValue));
 }
 
 }  // namespace

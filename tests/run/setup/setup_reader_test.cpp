@@ -146,6 +146,7 @@ TEST_F(SetupReaderTest, StopsAtTheFirstInvalidValueBeforeLaterSectionsAreRead) {
       StartsWith("Error: Objective function aggregation method invalid"));
   EXPECT_THAT(failure("Aggregation_Method = 0 => Minimum_Coverage = 1.1"),
               StartsWith("Error: Minimum coverage invalid"));
+  EXPECT_THAT(failure("Aggregation_Method = 0 => Largest_Gap = -1.0"), StartsWith("Error: Largest gap invalid"));
   EXPECT_THAT(failure("Option = 2 => 0 & [OPTIMISATION_ALGORITHM] => [X] & [/OPTIMISATION_ALGORITHM] => [/X] & "
                       "NoSimultaneousSim = 4 => 0"),
               StartsWith("Error: Invalid No. of processes"))
