@@ -25,6 +25,11 @@ std::optional<EvaluationResult> EarlierEvaluations::take(int number, std::span<c
   return result;
 }
 
+bool EarlierEvaluations::repeatsRun(int number) const {
+  const auto found = records_.find(number);
+  return found != records_.end() && found->second.repeatsRun;
+}
+
 void EarlierEvaluations::requireSameValues(int number, std::span<const double> earlier,
                                            std::span<const double> set) const {
   const auto other = findOtherValue(space_, set, earlier);

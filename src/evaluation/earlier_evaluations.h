@@ -18,6 +18,7 @@ class EarlierEvaluations final {
   struct Record {
     std::vector<double> parameterValues;  ///< model scale, one per variable parameter
     EvaluationResult result;              ///< complete except for the aggregate
+    bool repeatsRun = false;              ///< the model is run again, for pairs that are lost; the result stays
   };
 
   /// `records` by evaluation number. The aggregator must outlive the object.
@@ -27,6 +28,8 @@ class EarlierEvaluations final {
   /// the run; empty if the earlier run did not make it. `set` is on the search scale. Throws FatalError if the earlier
   /// run evaluated another set under this number.
   std::optional<EvaluationResult> take(int number, std::span<const double> set);
+  /// Whether the evaluation with this number needs a model run before its result is taken.
+  bool repeatsRun(int number) const;
 
  private:
   void requireSameValues(int number, std::span<const double> earlier, std::span<const double> set) const;

@@ -17,6 +17,7 @@ void EvaluationLedger::begin(std::span<const ParameterSet> sets, DispatchMode mo
   isFinalRun_ = mode == DispatchMode::finalRun;
   if (earlier_ == nullptr || isFinalRun_) return;
   for (std::size_t place = 0; place < sets.size(); ++place) {
+    if (earlier_->repeatsRun(numberOf(place))) continue;
     if (auto result = earlier_->take(numberOf(place), sets[place])) replay(place, std::move(*result));
   }
 }
@@ -83,7 +84,7 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
   observer_.message(progress::completedMessage(result.number, outcome));
   if (known) {
     known->shownSeries = std::move(result.shownSeries);
-    known->pairs = std::move(result.pairs);
+    if (result.ok()) known->pairs = std::move(result.pairs);
     return replay(place, std::move(*known));
   }
   observer_.evaluationFinished(sets_[place], result);

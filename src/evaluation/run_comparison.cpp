@@ -2,6 +2,8 @@
 
 #include <algorithm>
 #include <array>
+#include <functional>
+#include <iterator>
 #include <string_view>
 
 #include <fmt/core.h>
@@ -74,6 +76,11 @@ std::vector<MeasureSource> measureSources(std::span<const OutputMeasure> measure
     sources.push_back({std::string(trimTrailing(measure.name)), std::move(file), isSeries});
   }
   return sources;
+}
+
+std::size_t pairedCount(std::span<const MeasureSource> sources) {
+  const auto series = std::count_if(sources.begin(), sources.end(), std::mem_fn(&MeasureSource::isSeries));
+  return static_cast<std::size_t>(series) + (std::ssize(sources) > series ? 1 : 0);
 }
 
 std::vector<RunDifference> findDifferences(int number, std::span<const MeasurePairs> pairs, int firstNumber,

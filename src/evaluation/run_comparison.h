@@ -23,6 +23,9 @@ struct MeasureSource {
 std::vector<MeasureSource> measureSources(std::span<const OutputMeasure> measures, const std::string& measureFile,
                                           const std::string& baseFolder);
 
+/// How many MeasurePairs a successful run has.
+std::size_t pairedCount(std::span<const MeasureSource> sources);
+
 /// Something by which a model run is worth less than the first successful one, perhaps.
 struct RunDifference {
   enum class Kind { fewerPairs, gap, otherCount };

@@ -33,8 +33,9 @@ StoredResults resultsOf(const RunConfig& config, const SearchSpace& space, std::
                         const PairsByNumber& pairs) {
   std::map<int, StoredResults::Record> records;
   for (const ResultRow& row : rows) {
-    auto& [values, result] = records[row.number];
-    values = row.parameters;
+    StoredResults::Record& record = records[row.number];
+    record.parameterValues = row.parameters;
+    EvaluationResult& result = record.result;
     result.measureValues = row.measures;
     result.objectiveValues = row.objectives;
     result.aggregate = row.aggregate;

@@ -66,6 +66,9 @@ void RunReporter::evaluationReplayed(std::span<const double> set, const Evaluati
   state_.progress.progressReplayed(result.number, result.ok());
   // It is computed again from the objective functions; what the earlier run's file says need not be true.
   if (result.ok() && !std::isnan(result.aggregate)) results_.replaceAggregate(result.number, result.aggregate);
+  // They were lost, and its model run was repeated for them.
+  const bool lacksPairs = pairs_ != nullptr && !result.pairs.empty() && !pairs_->has(result.number);
+  if (lacksPairs) pairs_->add(result.number, result.pairs);
   const std::vector<double> values = ToModelScale(space_, set);
   count(values, result, {});
   if (!result.shownSeries.empty()) {

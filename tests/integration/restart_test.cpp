@@ -161,11 +161,15 @@ TEST_F(Restart, RunsAreComparedWithTheFirstSuccessfulOneThatWasMadeBefore) {
     writeSetup({.option = 0, .scenarios = values, .slots = 3});
     if (mayFail) folder_.editSetup("    Aggregation_Method", "    Minimum_Coverage = 0.5\n    Aggregation_Method");
     std::string expected;
-    for (const char* lastRow : {"", "\n5\t", "\n9\t"}) {
+    for (const char* lastRow : {"", "\n5\t", "\n9\t", "\n5\tOK"}) {
       const std::string whole = results();
       if (*lastRow != '\0') folder_.write(resultFile_, whole.substr(0, whole.find(lastRow) + 4));
+      const bool losesPairs = std::string_view(lastRow).ends_with("OK");
+      if (losesPairs) std::filesystem::remove(folder_ / "basin_Pairs.dat");
       const ProgramResult program = runProgram({setup_});
       ASSERT_EQ(program.exitCode, 0) << program.error;
+      EXPECT_EQ(occurrences(log(), "basin_Pairs.dat does not have the pairs of evaluation No. 1, "),
+                losesPairs ? 1 : 0);
       const std::string found = results() + folder_.read("basin_Pairs.dat");
       if (*lastRow == '\0') expected = found;
       EXPECT_EQ(found, expected) << mayFail << lastRow;

@@ -149,10 +149,14 @@ TEST_F(RunReporterTest, EvaluationsThatDifferFromTheFirstSuccessfulRunAreNamed) 
             Not(HasSubstr("No. 8: 2 of 48")), HasSubstr("\nWarning: Evaluation of parameter set No. 23: a day\n"),
             HasSubstr("\n   Evaluation of parameter set No. 24: a day\n")));
 
-  EXPECT_EQ(pairs_.readEarlier({3, 7, 30}), (PairsByNumber{{3, {first, numbers}}, {7, {two, numbers}}}));
+  const PairsByNumber written = pairs_.readEarlier().pairs;
+  EXPECT_EQ(written.at(3), (std::vector{first, numbers}));
+  EXPECT_EQ(written.at(7), (std::vector{two, numbers}));
   std::string reason;
   EXPECT_TRUE(pairs_.finish(reporter_.numbersWithPairs(), reason)) << reason;
-  EXPECT_EQ(pairs_.readEarlier({1, 3, 7}), (PairsByNumber{{1, {first, numbers}}, {7, {two, numbers}}}));
+  const PairsByNumber left = pairs_.readEarlier().pairs;
+  EXPECT_EQ(left.size(), 23U);
+  EXPECT_EQ(left.count(3), 0U);
 }
 
 TEST_F(RunReporterTest, AnEvaluationReachesResultFileLogProgressAndTheFileOfFailures) {

@@ -1,5 +1,6 @@
 #include "run/results/pairs_file.h"
 
+#include <algorithm>
 #include <cmath>
 #include <cstddef>
 #include <cstdint>
@@ -94,22 +95,36 @@ std::optional<MeasurePairs> pairsOf(std::span<const std::string> cells) {
   return MeasurePairs{*measure - 1, *count, *missing, *first, *last, *observed, *simulated, *form};
 }
 
-}  // namespace
+/// Lines that are not for people, the header row among them.
+std::size_t lineCount(std::string_view text) {
+  const std::vector<std::string_view> lines = splitLines(text);
+  return static_cast<std::size_t>(std::count_if(
+      lines.begin(), lines.end(), [](std::string_view line) { return !line.empty() && !line.starts_with('#'); }));
+}
 
-PairsByNumber readPairsTable(std::string_view text) {
-  PairsByNumber read;
+EarlierPairs readPairs(std::string_view text) {
+  EarlierPairs read;
   const ReadTable table = readDataTable(text);
+  const std::size_t lines = lineCount(text);
+  read.lostRows = lines - std::min<std::size_t>(lines, 1);
   if (table.columns != columns()) return read;
   for (const std::vector<std::string>& cells : table.rows) {
     const auto number = parseInteger(cells[0]);
     const auto found = pairsOf(cells);
     if (!number || !found) continue;
+    --read.lostRows;
     // A row that was written again, as its evaluation had to be repeated, replaces the first.
-    std::vector<MeasurePairs>& pairs = read[*number];
+    std::vector<MeasurePairs>& pairs = read.pairs[*number];
     std::erase_if(pairs, [&found](const MeasurePairs& other) { return other.measure == found->measure; });
     pairs.push_back(*found);
   }
   return read;
+}
+
+}  // namespace
+
+PairsByNumber readPairsTable(std::string_view text) {
+  return readPairs(text).pairs;
 }
 
 std::string pairsTableText(std::span<const std::string> head, const PairsByNumber& pairs) {
@@ -121,10 +136,8 @@ std::string pairsTableText(std::span<const std::string> head, const PairsByNumbe
 PairsFile::PairsFile(std::string path, std::vector<std::string> tableHead)
     : path_(std::move(path)), tableHead_(std::move(tableHead)) {}
 
-PairsByNumber PairsFile::readEarlier(const std::set<int>& numbers) const {
-  PairsByNumber earlier = readPairsTable(readFileIfThere(path_).value_or(""));
-  std::erase_if(earlier, [&numbers](const auto& entry) { return numbers.count(entry.first) == 0; });
-  return earlier;
+EarlierPairs PairsFile::readEarlier() const {
+  return readPairs(readFileIfThere(path_).value_or(""));
 }
 
 void PairsFile::continueBehind(PairsByNumber earlier) {

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <map>
 #include <set>
 #include <span>
@@ -15,6 +16,12 @@ namespace mirevo {
 /// Pairs by the number of their evaluation.
 using PairsByNumber = std::map<int, std::vector<MeasurePairs>>;
 
+/// The pairs that an earlier run has left.
+struct EarlierPairs {
+  PairsByNumber pairs;
+  std::size_t lostRows = 0;  ///< cut off or damaged
+};
+
 /// The pairs and files of the first successful run and of the runs that differ, `<setup>_Pairs.dat` and its like: for
 /// programs, and for a restart, which compares further runs with the first successful one. The file appears with the
 /// first pairs.
@@ -23,9 +30,8 @@ class PairsFile final {
   /// `tableHead` is over the table, for people.
   PairsFile(std::string path, std::vector<std::string> tableHead);
 
-  /// What an interrupted run has left of the evaluations with those numbers. Throws FatalError if the file cannot be
-  /// read.
-  PairsByNumber readEarlier(const std::set<int>& numbers) const;
+  /// What an interrupted run has left. Throws FatalError if the file cannot be read.
+  EarlierPairs readEarlier() const;
   /// Continues the file behind those pairs. Throws FatalError.
   void continueBehind(PairsByNumber earlier);
   /// Throws FatalError when they cannot be written.
@@ -34,6 +40,7 @@ class PairsFile final {
   /// False, with the system's reason, when that fails.
   bool finish(const std::set<int>& numbers, std::string& reason);
 
+  bool has(int number) const { return pairs_.count(number) > 0; }
   const std::string& path() const { return path_; }
 
  private:

@@ -176,6 +176,15 @@ std::map<int, EarlierEvaluations::Record> earlierRecords(EarlierRun& run,
   return records;
 }
 
+int firstWithoutPairs(std::span<const ResultRow> rows, const PairsByNumber& pairs, std::size_t count) {
+  const auto first = std::find_if(rows.begin(), rows.end(), [](const ResultRow& row) { return row.ok; });
+  if (first == rows.end()) return 0;
+  // The row of an earlier one may be lost, which is then made again.
+  const auto isKnown = std::any_of(pairs.begin(), pairs.upper_bound(first->number),
+                                   [count](const auto& entry) { return entry.second.size() >= count; });
+  return isKnown || count == 0 ? 0 : first->number;
+}
+
 void writeRestartSettings(const std::string& path, const RunConfig& config) {
   std::string reason;
   if (!replaceFile(path, formatRestartSettings(restartSettings(config)), reason)) {

@@ -1,7 +1,9 @@
 #pragma once
 
+#include <cstddef>
 #include <map>
 #include <optional>
+#include <span>
 #include <string>
 #include <vector>
 
@@ -52,6 +54,10 @@ std::map<int, EarlierEvaluations::Record> earlierRecords(EarlierRun& run,
                                                          const std::map<int, EvaluationFailure>& failures,
                                                          const PairsByNumber& pairs,
                                                          std::optional<std::map<int, KeptValues>> keptValues);
+
+/// The number of the first successful evaluation in `rows`, which are in the order of their numbers, if `pairs` has not
+/// `count` of it, and of none before it; otherwise 0.
+int firstWithoutPairs(std::span<const ResultRow> rows, const PairsByNumber& pairs, std::size_t count);
 
 /// Writes the settings of this run. Throws FatalError.
 void writeRestartSettings(const std::string& path, const RunConfig& config);

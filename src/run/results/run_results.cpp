@@ -16,6 +16,7 @@
 #include "common/take_text.h"
 #include "common/text.h"
 #include "common/version.h"
+#include "evaluation/run_comparison.h"
 #include "run/results/record_file.h"
 #include "run/results/run_record.h"
 #include "run/results/shared_files.h"
@@ -210,6 +211,33 @@ void RunResults::removeStatistics(const RunConfig& config) const {
   for (const std::string& path : bandPaths(config)) std::filesystem::remove(path, ignored);
 }
 
+/// Further runs must not be judged by another run than those before: the first successful one is repeated if its pairs
+/// are lost.
+void RunResults::restorePairs(const RunConfig& config, std::span<const ResultRow> rows, EarlierPairs& earlier,
+                              std::map<int, EarlierEvaluations::Record>& records, RunLog& log) const {
+  const std::size_t count = pairedCount(measureSources(config.measures, config.measureFile, config.baseFolder));
+  const int first = firstWithoutPairs(rows, earlier.pairs, count);
+  std::erase_if(earlier.pairs, [&](const auto& entry) {
+    const auto record = records.find(entry.first);
+    return record == records.end() || !record->second.result.ok() || entry.first == first;
+  });
+  constexpr const char* kKnown = "is known only as far as the file still says";
+  if (first != 0) {
+    records.at(first).repeatsRun = true;
+    records.at(first).result.pairs.clear();
+    log.warning(
+        fmt::format("{} does not have the pairs of evaluation No. {}, the first successful run, with which others are "
+                    "compared: its "
+                    "model run is repeated. Which other evaluations of the earlier run differ from it {}",
+                    pairs_.path(), first, kKnown));
+  } else if (earlier.lostRows > 0) {
+    log.warning(fmt::format(
+        "Rows of {} that are cut off or damaged: {}. Which evaluations of the earlier run differ from the first "
+        "successful run {}",
+        pairs_.path(), earlier.lostRows, kKnown));
+  }
+}
+
 void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggregator, RunLog& log) {
   EarlierRun run = *std::exchange(earlierRun_, std::nullopt);
   keepResultsOfAnother(files_.results, pathsBesideResults(), config.setupFile, log);
@@ -227,8 +255,9 @@ void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggreg
   std::optional<std::map<int, KeptValues>> values;
   if (simulatedValues_) values = simulatedValues_->takeUp(succeeded);
   const std::size_t withoutValues = values ? succeeded.size() - values->size() : 0;
-  PairsByNumber pairs = pairs_.readEarlier(succeeded);
-  auto records = earlierRecords(run, failures, pairs, std::move(values));
+  EarlierPairs earlierPairs = pairs_.readEarlier();
+  auto records = earlierRecords(run, failures, earlierPairs.pairs, std::move(values));
+  restorePairs(config, run.rows, earlierPairs, records, log);
 
   RunRecord record = recordOf(config, log);
   record.started = run.started;
@@ -238,7 +267,7 @@ void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggreg
   table_.open(files_.results, headLines(config, record), columns_, run.rows);
   // Only now: were the run killed before, rows that are gone from the table would still be in it.
   logKept(failedRuns_.paths().forPeople, failedRuns_.continueBehind(earlier.rows, failedSets), log);
-  pairs_.continueBehind(std::move(pairs));
+  pairs_.continueBehind(std::move(earlierPairs.pairs));
   const std::string failedFolders = runFilePath(processFolderPrefix(config), run_files::kFailedFolder);
   for (const std::string& problem : removeFailedRunFolders(failedFolders, failed)) log.warning(problem);
   // With a raised budget in it, rows that the smaller one had ended would be taken for the search's.
