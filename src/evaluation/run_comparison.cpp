@@ -17,14 +17,22 @@ namespace {
 using Kind = RunDifference::Kind;
 
 /// In the order of the kinds.
-constexpr std::array<DifferenceTexts, 3> kTexts{{
+constexpr std::array<DifferenceTexts, 4> kTexts{{
     {Kind::fewerPairs, "Fewer pairs", "is judged by fewer observations than the first successful run",
      "are judged by fewer observations than the first successful run", false},
+    {Kind::fewerThanAnother, "Fewer pairs than another", "is judged by fewer observations than another run",
+     "are judged by fewer observations than another run", false},
     {Kind::gap, "Gap", "has a longer gap in its simulated steps than the first successful run",
      "have a longer gap in their simulated steps than the first successful run", true},
     {Kind::otherCount, "Count of numbers", "has another count of numbers than the first successful run",
      "have another count of numbers than the first successful run", true},
 }};
+
+const MeasurePairs* pairsOf(std::size_t measure, std::span<const MeasurePairs> pairs) {
+  const auto found =
+      std::find_if(pairs.begin(), pairs.end(), [measure](const MeasurePairs& each) { return each.measure == measure; });
+  return found == pairs.end() ? nullptr : &*found;
+}
 
 std::string rangeText(std::string_view what, const ValueSummary& range) {
   return fmt::format("{} {:.6g} to {:.6g}, mean {:.6g}", what, range.least, range.largest, range.mean);
@@ -92,9 +100,8 @@ std::vector<RunDifference> findDifferences(int number, std::span<const MeasurePa
   };
   std::vector<std::string_view> seen;
   for (const MeasurePairs& found : pairs) {
-    const auto same = std::find_if(first.begin(), first.end(),
-                                   [&found](const MeasurePairs& other) { return other.measure == found.measure; });
-    if (same == first.end() || found.measure >= sources.size()) continue;
+    const MeasurePairs* const same = pairsOf(found.measure, first);
+    if (same == nullptr || found.measure >= sources.size()) continue;
     const MeasureSource& source = sources[found.measure];
     if (found.count < same->count) {
       add(Kind::fewerPairs, found.measure,
@@ -120,6 +127,32 @@ std::vector<RunDifference> findDifferences(int number, std::span<const MeasurePa
   return differences;
 }
 
+std::vector<RunDifference> findLackOfBest(int best, const std::map<int, std::vector<MeasurePairs>>& pairs,
+                                          std::span<const MeasureSource> sources) {
+  std::vector<RunDifference> differences;
+  if (pairs.empty()) return differences;
+  const std::vector<MeasurePairs>& first = pairs.begin()->second;
+  const auto kept = pairs.find(best);
+  for (const MeasurePairs& own : kept == pairs.end() ? first : kept->second) {
+    const MeasurePairs* const ofFirst = pairsOf(own.measure, first);
+    if (ofFirst == nullptr || own.count < ofFirst->count || own.measure >= sources.size()) continue;
+    std::size_t most = own.count;
+    int number = best;
+    for (const auto& [otherNumber, others] : pairs) {
+      const MeasurePairs* const other = pairsOf(own.measure, others);
+      if (other == nullptr || other->count <= most) continue;
+      most = other->count;
+      number = otherNumber;
+    }
+    if (number == best) continue;
+    differences.push_back({best, own.measure, Kind::fewerThanAnother,
+                           fmt::format("output measure \"{}\" has {}, {} in evaluation No. {}",
+                                       sources[own.measure].name, countText(own.count, "pair"), most, number),
+                           false});
+  }
+  return differences;
+}
+
 std::vector<std::string> sentencesOnBest(int best, std::span<const RunDifference> differences) {
   std::vector<std::string> sentences;
   for (const DifferenceTexts& texts : kTexts) {
@@ -135,9 +168,7 @@ std::vector<std::string> sentencesOnBest(int best, std::span<const RunDifference
 }
 
 const MeasurePairs* RunComparison::firstOf(std::size_t measure) const {
-  const auto found = std::find_if(first_.begin(), first_.end(),
-                                  [measure](const MeasurePairs& pairs) { return pairs.measure == measure; });
-  return found == first_.end() ? nullptr : &*found;
+  return pairsOf(measure, first_);
 }
 
 bool RunComparison::judge(int number, EvaluationResult& result) const {

@@ -28,7 +28,7 @@ std::size_t pairedCount(std::span<const MeasureSource> sources);
 
 /// Something by which a model run is worth less than the first successful one, perhaps.
 struct RunDifference {
-  enum class Kind { fewerPairs, gap, otherCount };
+  enum class Kind { fewerPairs, fewerThanAnother, gap, otherCount };
   int number = 0;           ///< of the evaluation
   std::size_t measure = 0;  ///< 0-based; of several that read the same file the first
   Kind kind = Kind::fewerPairs;
@@ -50,6 +50,12 @@ std::span<const DifferenceTexts> differenceTexts();
 /// In what a run differs from the first successful one.
 std::vector<RunDifference> findDifferences(int number, std::span<const MeasurePairs> pairs, int firstNumber,
                                            std::span<const MeasurePairs> first, std::span<const MeasureSource> sources);
+
+/// In what the best evaluation, which has no fewer pairs of a measure than the first successful run, has fewer than
+/// another. `pairs`, by number: those of the first successful run, of runs that differ from it or have others, and of
+/// no run before it.
+std::vector<RunDifference> findLackOfBest(int best, const std::map<int, std::vector<MeasurePairs>>& pairs,
+                                          std::span<const MeasureSource> sources);
 
 /// A sentence, without its full stop, for each kind of difference of the best evaluation, which has that number;
 /// `differences` may be those of others, too. What precedes the colon depends on kind and number alone.

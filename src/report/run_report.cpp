@@ -251,11 +251,13 @@ PairsByNumber ReportBuilder::pairsOfRuns() const {
 void ReportBuilder::noteDifferencesOfBest() {
   if (best_ == nullptr) return;
   const PairsByNumber pairs = pairsOfRuns();
-  const auto ofBest = pairs.find(best_->number);
-  if (ofBest == pairs.end()) return;
-  const auto& [firstNumber, first] = *pairs.begin();
-  const auto differences = findDifferences(best_->number, ofBest->second, firstNumber, first,
-                                           measureSources(config_.measures, config_.measureFile, config_.baseFolder));
+  const auto sources = measureSources(config_.measures, config_.measureFile, config_.baseFolder);
+  std::vector<RunDifference> differences = findLackOfBest(best_->number, pairs, sources);
+  if (const auto ofBest = pairs.find(best_->number); ofBest != pairs.end()) {
+    const auto& [firstNumber, first] = *pairs.begin();
+    const auto fromFirst = findDifferences(best_->number, ofBest->second, firstNumber, first, sources);
+    differences.insert(differences.end(), fromFirst.begin(), fromFirst.end());
+  }
   for (const std::string& text : sentencesOnBest(best_->number, differences)) {
     const std::string sentence = text.substr(0, text.find(':'));
     const bool isSaid = std::any_of(data_.summary.begin(), data_.summary.end(),

@@ -235,9 +235,9 @@ void RunDriver::openResults() {
   results_->open(config_, runner_->observedSeries(), *aggregator_, state_.log);
   putEarlierReportAside();
   signalState.resultFileDescriptor = results_->table().descriptor();
-  reporter_ =
-      std::make_unique<RunReporter>(state_, results_->table(), results_->failedRuns(), parameters_->searchSpace(),
-                                    results_->simulatedValues(), &results_->pairs());
+  reporter_ = std::make_unique<RunReporter>(state_, results_->table(), results_->failedRuns(),
+                                            parameters_->searchSpace(), results_->simulatedValues(), &results_->pairs(),
+                                            measureSources(config_.measures, config_.measureFile, config_.baseFolder));
   openSeries();
   failedRunPolicy_.emplace(config_.plannedEvaluations(), config_.failedRunFolders);
   EarlierEvaluations* const earlier = results_->earlierEvaluations();

@@ -24,13 +24,14 @@ const DifferenceTexts& textsOf(RunDifference::Kind kind) {
 }  // namespace
 
 RunReporter::RunReporter(RunState& state, ResultFile& results, FailedRunFile& failedRuns, const SearchSpace& space,
-                         SimulatedValuesFile* simulatedValues, PairsFile* pairs)
+                         SimulatedValuesFile* simulatedValues, PairsFile* pairs, std::vector<MeasureSource> sources)
     : state_(state),
       results_(results),
       failedRuns_(failedRuns),
       space_(space),
       simulatedValues_(simulatedValues),
       pairs_(pairs),
+      sources_(std::move(sources)),
       initial_(ToModelScale(space, space.initial)) {}
 
 void RunReporter::message(std::string_view text) {
@@ -140,6 +141,7 @@ std::vector<std::string> RunReporter::differenceWarnings() const {
 std::vector<std::string> RunReporter::differencesOfBest() const {
   if (!best()) return {};
   std::vector<RunDifference> ofBest;
+  if (pairs_ != nullptr) ofBest = findLackOfBest(best()->number, pairs_->pairs(), sources_);
   for (const auto& [key, difference] : differences_) {
     if (difference.number == best()->number) ofBest.push_back(difference);
   }

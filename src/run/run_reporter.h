@@ -27,8 +27,10 @@ class RunReporter final : public EvaluationObserver {
  public:
   /// The result file must be open; all must outlive the reporter. `simulatedValues` receives the
   /// simulated values of every successful evaluation, `pairs` the pairs that are to be kept; both may be null.
+  /// `sources`: of all output measures.
   RunReporter(RunState& state, ResultFile& results, FailedRunFile& failedRuns, const SearchSpace& space,
-              SimulatedValuesFile* simulatedValues = nullptr, PairsFile* pairs = nullptr);
+              SimulatedValuesFile* simulatedValues = nullptr, PairsFile* pairs = nullptr,
+              std::vector<MeasureSource> sources = {});
 
   /// From now on `recorder` records the series of the initial and the best evaluation; it must outlive the reporter.
   void recordSeries(SeriesRecorder& recorder) { recorder_ = &recorder; }
@@ -92,6 +94,7 @@ class RunReporter final : public EvaluationObserver {
   const SearchSpace& space_;
   SimulatedValuesFile* simulatedValues_;
   PairsFile* pairs_;
+  std::vector<MeasureSource> sources_;
   SeriesRecorder* recorder_ = nullptr;
   BestChoice best_;
   InitialChoice initial_;

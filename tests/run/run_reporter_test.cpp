@@ -149,6 +149,22 @@ TEST_F(RunReporterTest, EvaluationsThatDifferFromTheFirstSuccessfulRunAreNamed) 
             Not(HasSubstr("No. 8: 2 of 48")), HasSubstr("\nWarning: Evaluation of parameter set No. 23: a day\n"),
             HasSubstr("\n   Evaluation of parameter set No. 24: a day\n")));
 
+  const std::vector<MeasureSource> sources{{"flow", "flow.csv", true}, {"peak", "peak.txt", false}};
+  const auto lackOf = [&](int best) { return sentencesOnBest(best, findLackOfBest(best, pairs_.pairs(), sources)); };
+  const std::vector<std::string> lack{
+      "The best evaluation, No. 1, is judged by fewer observations than another run: output measure \"flow\" has 48 "
+      "pairs, 50 in evaluation No. 28"};
+  EXPECT_THAT(lackOf(1), testing::IsEmpty());
+  for (const int number : {27, 28, 29}) {
+    MeasurePairs more = first;
+    more.count = number == 27 ? 49 : 50;
+    pairs_.add(number, std::vector{more, numbers});
+  }
+  EXPECT_EQ(lackOf(1), lack);
+  EXPECT_EQ(lackOf(2).size(), 1U) << "not kept, as it has the pairs of the first";
+  EXPECT_THAT(lackOf(7), testing::IsEmpty()) << "said by its difference from the first";
+  EXPECT_THAT(lackOf(28), testing::IsEmpty());
+
   const PairsByNumber written = pairs_.readEarlier().pairs;
   EXPECT_EQ(written.at(3), (std::vector{first, numbers}));
   EXPECT_EQ(written.at(7), (std::vector{two, numbers}));

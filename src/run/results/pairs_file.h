@@ -41,6 +41,8 @@ class PairsFile final {
   bool finish(const std::set<int>& numbers, std::string& reason);
 
   bool has(int number) const { return pairs_.count(number) > 0; }
+  /// All that it holds.
+  const PairsByNumber& pairs() const { return pairs_; }
   const std::string& path() const { return path_; }
 
  private:
