@@ -11,7 +11,9 @@
 #include "common/encoding.h"
 #include "common/fatal_error.h"
 #include "common/files.h"
+#include "common/take_text.h"
 #include "common/text.h"
+#include "common/utf8.h"
 
 namespace mirevo {
 namespace {
@@ -234,6 +236,7 @@ GivenSample readInitialSample(std::string_view fileName, std::string_view text, 
   if (const std::string fault = faultOfEncoding(text); !fault.empty()) {
     fatalError(kInvalidFile, fmt::format("{}: {}", fileName, fault));
   }
+  takeText(text, kByteOrderMark);
   GivenSample sample;
   std::optional<RowSplitter> splitter;
   std::vector<std::size_t> parameters;

@@ -61,10 +61,11 @@ std::vector<ParameterSet> drawInitialSample(const InitialSampleSettings& setting
 std::size_t givenSetCount(const InitialSampleSettings& settings, std::size_t count);
 
 /// Reads a sample: a header row with the names of the variable parameters in any order, then one set per row on the
-/// model scale; blank lines and lines that start with `#` are skipped. Columns are separated by tabs, semicolons,
-/// commas or blanks: the first of these, in this order, that the header contains. Throws FatalError ("Error: Initial
-/// sample file invalid") with file and line for names that are unknown, missing or repeated, values that are not
-/// numbers or are outside their bounds, rows of a different length from the header, and a file without rows.
+/// model scale; blank lines and lines that start with `#` are skipped, and so is a byte-order mark. Columns are
+/// separated by tabs, semicolons, commas or blanks: the first of these, in this order, that the header contains. Throws
+/// FatalError ("Error: Initial sample file invalid") with file and line for names that are unknown, missing or
+/// repeated, values that are not numbers or are outside their bounds, rows of a different length from the header, and a
+/// file without rows.
 GivenSample readInitialSample(std::string_view fileName, std::string_view text, const SearchSpace& space);
 
 /// readInitialSample() of a file.

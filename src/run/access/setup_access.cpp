@@ -257,8 +257,10 @@ SetupSection SetupSection::openItem(std::string_view prefix, std::size_t number)
   const KdxKeyword* count = node_->keyword(kItemCountKeyword);
   const auto* wanted = count == nullptr ? nullptr : std::get_if<std::int32_t>(&count->values.front().value);
   if (wanted == nullptr) failMissing(name, {});
-  failMissing(name, fmt::format("\n{}: {} is {}, and there are here: {}", location(kItemCountKeyword),
-                                kItemCountKeyword, *wanted, present.empty() ? "none" : present));
+  // Where there are others, the count may be what is wrong.
+  failMissing(
+      name, fmt::format("\n{}: {} is {}, and there are here: {}{}", location(kItemCountKeyword), kItemCountKeyword,
+                        *wanted, present.empty() ? "none" : present, file_->linesToAdd(path_, name, present.empty())));
 }
 
 std::optional<SetupSection> SetupSection::itemBeyond(std::string_view prefix, std::size_t count) const {

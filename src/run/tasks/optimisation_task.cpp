@@ -9,6 +9,7 @@
 #include <fmt/format.h>
 
 #include "common/fatal_error.h"
+#include "common/files.h"
 #include "common/text.h"
 #include "run/access/file_validation.h"
 #include "run/tasks/infeasible_sets.h"
@@ -164,9 +165,13 @@ void OptimisationTask::read(const TaskReading& reading) {
 
 /// The values of the sample file, which runs get exactly.
 void OptimisationTask::takeGivenValues(const TaskReading& reading, const SetupSection& section) {
+  std::string reason;
+  sampleText_ = readTextFile(initialSample.fileName, reason);
+  if (!sampleText_) return;  // likewise
+  const SearchSpace space = BuildSearchSpace(reading.parameters);
   GivenSample sample;
   try {
-    sample = loadInitialSample(initialSample.fileName, BuildSearchSpace(reading.parameters));
+    sample = readInitialSample(initialSample.fileName, *sampleText_, space);
   } catch (const FatalError&) {
     return;  // refused later: bounds with the other parameters, the file by requireSets()
   }
@@ -180,12 +185,13 @@ void OptimisationTask::takeGivenValues(const TaskReading& reading, const SetupSe
   }
   const std::size_t distinct = std::set<ParameterSet>(sample.sets.begin(), sample.sets.end()).size();
   if (distinct == sample.sets.size()) return;
-  section.warn(kInitialSampleFileKeyword,
-               distinct == 1
-                   ? fmt::format("its {} sets are the same: a search proposes nothing else among equal points",
-                                 sample.sets.size())
-                   : fmt::format("{} of its {} sets are repetitions of others", sample.sets.size() - distinct,
-                                 sample.sets.size()));
+  const bool hasOther = initialSample.includeInitialParameters && sample.sets.front() != space.initial;
+  const char* const meaning = hasOther ? "with the initial set the sample has two different points"
+                                       : "a search proposes nothing else among equal points";
+  section.warn(kInitialSampleFileKeyword, distinct == 1
+                                              ? fmt::format("its {} sets are the same: {}", sample.sets.size(), meaning)
+                                              : fmt::format("{} of its {} sets are repetitions of others",
+                                                            sample.sets.size() - distinct, sample.sets.size()));
 }
 
 std::vector<double> OptimisationTask::givenValues(std::size_t parameter) const {
@@ -301,7 +307,8 @@ SearchProblem OptimisationTask::problemOf(const SearchSpace& space, const Feasib
   SearchProblem problem{searchBounds(space), stopping, initialSample, {}, evaluator, random};
   problem.earlierSearches = earlierSearches_;
   if (method->facts().drawsInitialSample && initialSample.generation == SampleGeneration::fromFile) {
-    problem.givenSample = loadInitialSample(initialSample.fileName, space).sets;
+    problem.givenSample = sampleText_ ? readInitialSample(initialSample.fileName, *sampleText_, space).sets
+                                      : loadInitialSample(initialSample.fileName, space).sets;
   }
   problem.feasibility = feasibility;
   return problem;

@@ -52,6 +52,7 @@ class OptimisationTask final : public Task {
                           UniformGenerator& random) const;
   SearchSummary search(const TaskContext& context) const;
 
+  std::optional<std::string> sampleText_;         ///< of a sample file, which is read once
   std::vector<std::vector<double>> givenValues_;  ///< those of a sample file, one entry per model parameter
   std::vector<EarlierSearch> earlierSearches_;
 };

@@ -86,6 +86,13 @@ TEST_F(SetupReaderTest, RefusesWhatCannotBeReadAndSaysWhere) {
       {"TqSEKdxListItemCount = 3 => 4",
        " section PARAMETER_4 in KDX file\nsetup.kdx:19:3: expected section [PARAMETER_4] in section MODEL_PARAMETERS\n"
        "setup.kdx:20:28: TqSEKdxListItemCount is 4, and there are here: PARAMETER_1, PARAMETER_2, PARAMETER_3"},
+      {"[SIMPARAMITEM_1] => [Item] & [/SIMPARAMITEM_1] => [/Item] & [STOPPING_CRITERIA] => [Stops] & "
+       "[/STOPPING_CRITERIA] => [/Stops]",
+       " section SIMPARAMITEM_1 in KDX file\nsetup.kdx:11:5: expected section [SIMPARAMITEM_1] in section SIMPARAM\n"
+       "setup.kdx:12:30: TqSEKdxListItemCount is 1, and there are here: none\nsections to add:\n   in "
+       "[MIREVO_SIMULATION_OPTION/SIMPARAM]:\n   [SIMPARAMITEM_1]\n     ParamFileName = ...\n     TemplateFileName = "
+       "...\n   [/SIMPARAMITEM_1]\n   in [OPTIMISATION_ALGORITHM]:\n   [STOPPING_CRITERIA]\n     "
+       "Max_No_Evaluations = ...\n   [/STOPPING_CRITERIA]"},
       {"[SimultaneousSimulations] => [Simultaneous] & [/SimultaneousSimulations] => [/Simultaneous]",
        " section SimultaneousSimulations in KDX file\nsetup.kdx:1:1: expected section [SimultaneousSimulations] in "
        "section MIREVO_PARAMETERS\nsections to add:\n   in [MIREVO_PARAMETERS]:\n   [SimultaneousSimulations]\n   "
@@ -234,7 +241,9 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatAreSeldomMeant)
        "the observed series is in setup_Band_1.csv, which"},
       {"File_Name = 'gauge.csv' => File_Name = 'setup_Band_x.csv'", ""},
       {"Initial_Sample_File_Name = 'sample.txt' => 'same.txt'",
-       "Initial_Sample_File_Name: its 2 sets are the same: a search proposes nothing else among equal points"},
+       "Initial_Sample_File_Name: its 2 sets are the same: with the initial set the sample has two different points"},
+      {"Initial_Sample_File_Name = 'sample.txt' => 'same.txt' & Include_Initial_Parameters = 1 => 0",
+       "its 2 sets are the same: a search proposes nothing else among equal points"},
       {"Initial_Sample_File_Name = 'sample.txt' => 'steps.txt' & Transformation_Type = 1 => 2 & "
        "Initial_Value = 412.5 => 412",
        "Initial_Sample_File_Name: 1 of the 3 values of the integer parameter \"Depth\" are not whole numbers of steps "
