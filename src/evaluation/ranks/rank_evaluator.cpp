@@ -85,6 +85,7 @@ void RankEvaluator::handle(const Message& message) {
 
 void RankEvaluator::takeResult(int rank, ResultMessage message) {
   requireSet(rank);
+  for (const std::string& text : std::exchange(message.warnings, {})) observer_.warning(text);
   worker(rank).answer = std::move(message);
 }
 

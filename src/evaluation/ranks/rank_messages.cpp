@@ -30,7 +30,7 @@ struct Layout<ReadyMessage> {
 };
 template <>
 struct Layout<ResultMessage> {
-  static void of(auto& archive, auto& message) { archive(message.result, message.leftBehind); }
+  static void of(auto& archive, auto& message) { archive(message.result, message.leftBehind, message.warnings); }
 };
 template <>
 struct Layout<KeepFolderMessage> {

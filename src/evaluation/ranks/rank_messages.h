@@ -47,7 +47,8 @@ struct SetMessage {
 
 struct ResultMessage {
   EvaluationResult result;
-  std::string leftBehind;  ///< what the launcher says of processes that had to be ended, or empty
+  std::string leftBehind;             ///< what the launcher says of processes that had to be ended, or empty
+  std::vector<std::string> warnings;  ///< of the worker, since its last message; those of this run are in `result`
 };
 
 /// Tells a worker to keep the folder of its last run.

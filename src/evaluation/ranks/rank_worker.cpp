@@ -6,6 +6,7 @@
 
 #include "common/clock.h"
 #include "common/fatal_error.h"
+#include "common/progress_messages.h"
 
 namespace mirevo {
 namespace {
@@ -43,7 +44,7 @@ bool isExecuting(ModelRunner& runner) {
 std::optional<ResultMessage> runModel(Job& job, ModelRunner& runner, const SetMessage& message) {
   runner.setStandard(message.standard);
   if (auto failure = runner.prepareModelRun(message.set, kSlot))
-    return ResultMessage{runner.failedResult(*failure), {}};
+    return ResultMessage{runner.failedResult(*failure), {}, {}};
   while (isExecuting(runner)) {
     runner.launcher().waitForChange(kBusyPollSeconds);
     const auto arrived = job.receive(0.0);
@@ -52,7 +53,7 @@ std::optional<ResultMessage> runModel(Job& job, ModelRunner& runner, const SetMe
     runner.launcher().haltProcesses();
     return std::nullopt;
   }
-  ResultMessage answer{runner.collect(kSlot), runner.launcher().leftBehind(kSlot)};
+  ResultMessage answer{runner.collect(kSlot), runner.launcher().leftBehind(kSlot), {}};
   runner.keepOutputFiles(kSlot, message.number, answer.result);
   return answer;
 }
@@ -66,7 +67,10 @@ void runWorkerLoop(Job& job, ModelRunner& runner) {
     const Message message = await(job);
     if (message.tag == static_cast<int>(RankMessage::stop)) return;
     if (message.tag == static_cast<int>(RankMessage::keepFolder)) {
-      runner.keepFailedFolder(kSlot, decodeKeepFolder(message.content).number, warnings);
+      std::vector<std::string> problems;
+      const int number = decodeKeepFolder(message.content).number;
+      runner.keepFailedFolder(kSlot, number, problems);
+      for (const std::string& text : problems) warnings.push_back(progress::nameOfEvaluation(number) + ": " + text);
       continue;
     }
     if (message.tag != static_cast<int>(RankMessage::set)) refuse(message);
@@ -78,9 +82,7 @@ void runWorkerLoop(Job& job, ModelRunner& runner) {
     }
     auto result = runModel(job, runner, decodeSet(message.content));
     if (!result) return;
-    std::vector<std::string>& told = result->result.warnings;
-    told.insert(told.begin(), warnings.begin(), warnings.end());
-    warnings.clear();
+    result->warnings = std::exchange(warnings, {});
     sendToMaster(job, RankMessage::result, encode(*result));
   }
 }

@@ -120,14 +120,17 @@ TEST_F(RankEvaluatorTest, FailedRunsOfAllWorkersCountTogether) {
   becomeReady(1);
   becomeReady(2);
   job_.onSend = [this](const Message& message) {
-    ResultMessage failed{runner_->failedResult({EvaluationFailure::Kind::exitCode, "code 3", {"last words"}}), "left"};
+    ResultMessage failed{
+        runner_->failedResult({EvaluationFailure::Kind::exitCode, "code 3", {"last words"}}), "left", {}};
+    failed.warnings = {"x was made anew"};
     job_.deliver(message.rank, RankMessage::result, encode(failed));
   };
   EXPECT_THAT(refusalOf([&] { evaluate(master, std::vector(4, 2.0)); }),
               AllOf(StartsWith("Error: Unable to continue. No of failed simulations too high.\n"),
                     HasSubstr("code 3\n| last words")));
   EXPECT_EQ(failedRuns_->failedCount(), 2);
-  EXPECT_THAT(observer_.events, Contains("warning: Evaluation of parameter set No. 1: left"));
+  EXPECT_THAT(observer_.events,
+              testing::IsSupersetOf({"warning: Evaluation of parameter set No. 1: left", "warning: x was made anew"}));
 }
 
 TEST_F(RankEvaluatorTest, AWorkersFatalErrorIsTheMastersWithItsPlace) {

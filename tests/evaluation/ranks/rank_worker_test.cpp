@@ -39,6 +39,10 @@ class RankWorkerTest : public EvaluationTest {
   std::vector<std::string> warningsOf(std::size_t set) const {
     return decodeResult(job_.sent.at(set).content).result.warnings;
   }
+  /// What came with it from the worker.
+  std::vector<std::string> workerWarningsOf(std::size_t set) const {
+    return decodeResult(job_.sent.at(set).content).warnings;
+  }
 
   FakeLauncher launcher_;
   FakeJob job_{3};
@@ -88,7 +92,9 @@ TEST_F(RankWorkerTest, AWarningIsToldOnceWithTheNextResultThere) {
   ASSERT_EQ(job_.sent.size(), 5U);
   EXPECT_THAT(warningsOf(1), ElementsAre(HasSubstr("often.txt was not kept: the model run did not write it")));
   EXPECT_THAT(warningsOf(2), IsEmpty());
-  EXPECT_THAT(warningsOf(3), ElementsAre(HasSubstr("The folder of this run was not kept as")));
+  EXPECT_THAT(workerWarningsOf(3),
+              ElementsAre(HasSubstr("Evaluation of parameter set No. 17: The folder of this run was not kept as")));
+  EXPECT_THAT(warningsOf(3), IsEmpty());
   EXPECT_THAT(warningsOf(4), IsEmpty());
 }
 
@@ -104,7 +110,7 @@ TEST_F(RankWorkerTest, AFolderThatIsDamagedAgainIsToldInPlaceOfAResult) {
   runWorkerLoop(job_, *runner_);
   ASSERT_THAT(sentTags(),
               ElementsAre(RankMessage::ready, RankMessage::result, RankMessage::result, RankMessage::givenUp));
-  EXPECT_THAT(warningsOf(2), ElementsAre(HasSubstr("was made anew")));
+  EXPECT_THAT(workerWarningsOf(2), ElementsAre(HasSubstr("was made anew")));
   EXPECT_EQ(decodeGivenUp(job_.sent[3].content).what, "Unable to open " + (folder_ / "run_Process1/parameters.txt"));
 }
 
@@ -125,7 +131,8 @@ TEST(RankMessages, ContentThatWasCutOrHasMoreIsRefused) {
                                .shownSeries = {{{10, 20}, {1.0F, 2.0F}}, {}},
                                .failure = EvaluationFailure{EvaluationFailure::Kind::signal, "why", {"a", ""}},
                                .warnings = {"careful"}},
-                              "left"};
+                              "left",
+                              {"made anew"}};
   const std::string content = encode(message);
   EXPECT_EQ(encode(decodeResult(content)), content);
   for (std::size_t length = 0; length < content.size(); ++length) {
