@@ -47,7 +47,7 @@ void RunReporter::recordEvaluation(std::span<const double> set, const Evaluation
   const std::vector<double> values = ToModelScale(space_, set);
   // The row is written last: if it is on disk, all that belongs to it is, too, whenever the program ends.
   if (!result.ok()) failedRuns_.add(values, result);
-  if (result.ok() && simulatedValues_ != nullptr) simulatedValues_->add(result);
+  if (result.ok() && simulatedValues_ != nullptr) simulatedValues_->add(values, result);
   if (!result.pairs.empty() && pairs_ != nullptr) pairs_->add(result.number, result.pairs);
   results_.addRow(resultRow(values, result));
 }

@@ -253,7 +253,7 @@ void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggreg
   std::map<int, EvaluationFailure> failures;
   for (const FailureRow& row : earlier.rows) failures[row.number] = row.failure;
   std::optional<std::map<int, KeptValues>> values;
-  if (simulatedValues_) values = simulatedValues_->takeUp(succeeded);
+  if (simulatedValues_) values = simulatedValues_->takeUp(run.rows);
   const std::size_t withoutValues = values ? succeeded.size() - values->size() : 0;
   EarlierPairs earlierPairs = pairs_.readEarlier();
   auto records = earlierRecords(run, failures, earlierPairs.pairs, std::move(values));

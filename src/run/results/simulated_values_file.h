@@ -2,13 +2,14 @@
 
 #include <cstddef>
 #include <map>
-#include <set>
+#include <span>
 #include <string>
 #include <vector>
 
 #include "evaluation/evaluation_result.h"
 #include "measures/observed_series.h"
 #include "run/results/record_file.h"
+#include "run/results/result_row.h"
 
 namespace mirevo {
 
@@ -20,7 +21,8 @@ struct KeptValues {
 
 /// The simulated values at the observation times of every evaluation, and its measures in 64 bits, for a task that uses
 /// them: the result file does not hold them, and a restarted run needs those of the evaluations that it does not
-/// repeat. Binary, one record per evaluation: its number, the values, the measures, a checksum of all. Not meant for
+/// repeat. Binary, one record per evaluation: its number, the values, the measures, a checksum of all and of the
+/// parameter values and measures in its row. Not meant for
 /// other programs: on a machine with another number format the file counts as damaged, and the evaluations are
 /// repeated.
 class SimulatedValuesFile final {
@@ -31,13 +33,14 @@ class SimulatedValuesFile final {
 
   /// Creates the file, replacing an existing one. Throws FatalError.
   void create();
-  /// Continues the file of an interrupted run: keeps the records of the evaluations with these numbers, appends to them
-  /// from now on, and returns their values by number. Records that are cut off, damaged or of other evaluations are
-  /// dropped, and so are all of a file of another precision. Throws FatalError when the file cannot be written.
-  std::map<int, KeptValues> takeUp(const std::set<int>& numbers);
+  /// Continues the file of an interrupted run: keeps the records of the successful evaluations among `rows`, appends to
+  /// them from now on, and returns their values by number. Records that are cut off, damaged or of other evaluations,
+  /// perhaps of another run, are dropped, and so are all of a file of another precision. Throws FatalError when the
+  /// file cannot be written.
+  std::map<int, KeptValues> takeUp(std::span<const ResultRow> rows);
 
-  /// Writes the values of a successful evaluation. Throws FatalError when that fails.
-  void add(const EvaluationResult& result);
+  /// Writes the values of a successful evaluation; `parameterValues` as in its row. Throws FatalError when that fails.
+  void add(std::span<const double> parameterValues, const EvaluationResult& result);
   /// Throws FatalError if not everything written has reached the file.
   void close() { file_.close(); }
 

@@ -215,7 +215,15 @@ TEST(SimulatedValuesFile, KeepsWholeRecordsOfTheEvaluationsThatCount) {
     result.number = number;
     result.simulatedValues = {0.1 * number};
     result.exactMeasures = {-1.0 * number};
-    file.add(result);
+    result.measureValues = {0.5 * number};
+    file.add(std::vector{1.0 * number}, result);
+  };
+  const auto rowsOf = [](const std::vector<int>& numbers, double parameterOf2 = 2.0, double measureOf3 = 1.5) {
+    std::vector<ResultRow> rows;
+    for (const int n : numbers) {
+      rows.push_back({n, true, {n == 2 ? parameterOf2 : 1.0 * n}, {n == 3 ? measureOf3 : 0.5 * n}, {}, 0.0});
+    }
+    return rows;
   };
   const auto fileOf = [&](SeriesPrecision precision = SeriesPrecision::single) {
     return SimulatedValuesFile(folder / "v.bin", 1, precision, 1);
@@ -230,7 +238,7 @@ TEST(SimulatedValuesFile, KeepsWholeRecordsOfTheEvaluationsThatCount) {
   for (std::size_t length = 0; length <= whole.size(); ++length) {
     folder.write("v.bin", whole.substr(0, length));
     SimulatedValuesFile cut = fileOf();
-    const auto found = cut.takeUp({1, 3});
+    const auto found = cut.takeUp(rowsOf({1, 3}));
     const std::size_t records = length < kHead ? 0 : (length - kHead) / kRecord;
     ASSERT_EQ(found.size(), std::min<std::size_t>(records, 2)) << length;
     for (const auto& [number, values] : found) {
@@ -243,10 +251,13 @@ TEST(SimulatedValuesFile, KeepsWholeRecordsOfTheEvaluationsThatCount) {
   std::string damaged = whole;
   damaged[kHead + kRecord + 10] ^= 1;
   folder.write("v.bin", damaged);
-  EXPECT_THAT(fileOf().takeUp({1, 2, 3}), ElementsAre(testing::Key(2), testing::Key(3)));
-  EXPECT_THAT(SimulatedValuesFile(folder / "v.bin", 3).takeUp({1, 2, 3}), IsEmpty()) << "of other series";
+  const std::vector<ResultRow> rows = rowsOf({1, 2, 3});
+  EXPECT_THAT(fileOf().takeUp(rows), ElementsAre(testing::Key(2), testing::Key(3)));
+  EXPECT_THAT(SimulatedValuesFile(folder / "v.bin", 3).takeUp(rows), IsEmpty()) << "of other series";
   folder.write("v.bin", whole);
-  EXPECT_THAT(fileOf(SeriesPrecision::exact).takeUp({1, 2, 3}), IsEmpty());
+  EXPECT_THAT(fileOf().takeUp(rowsOf({1, 2, 3}, 2.25, 1.75)), ElementsAre(testing::Key(1))) << "of another run";
+  folder.write("v.bin", whole);
+  EXPECT_THAT(fileOf(SeriesPrecision::exact).takeUp(rows), IsEmpty());
 }
 
 TEST(FailedRunFile, IsContinuedWithTheFailuresThatCount) {
