@@ -48,9 +48,21 @@ std::uint64_t stateOf(const std::string& path) {
   return state;
 }
 
+/// How many names of that file are in the folder.
+nlink_t namesIn(const std::string& folder, const struct stat& file) {
+  nlink_t names = 0;
+  visitEntries(folder, [&](const fs::directory_entry& entry) {
+    struct stat status {};
+    const bool isSame =
+        ::lstat(entry.path().c_str(), &status) == 0 && status.st_ino == file.st_ino && status.st_dev == file.st_dev;
+    if (isSame) ++names;
+  });
+  return names;
+}
+
 }  // namespace
 
-SharedTargets::SharedTargets(const std::string& folder, std::span<const std::string> own) {
+SharedTargets::SharedTargets(const std::string& folder, std::span<const std::string> own) : looksForHardLinks_(true) {
   const std::string root = resolvedPath(folder);
   const std::error_code failed = visitEntries(root, [&](const fs::directory_entry& entry) {
     std::error_code ignored;
@@ -79,6 +91,23 @@ std::vector<std::string> SharedTargets::takeChanged() {
         "model's folder with a folder or file.",
         target.path, target.link));
   }
+  return lines;
+}
+
+std::vector<std::string> SharedTargets::takeHardLinked(const std::string& folder, std::span<const std::string> files) {
+  std::vector<std::string> lines;
+  if (!looksForHardLinks_) return lines;
+  for (const std::string& file : files) {
+    struct stat status {};
+    const std::string path = folder + file;
+    if (::stat(path.c_str(), &status) != 0 || !S_ISREG(status.st_mode) || status.st_nlink < 2) continue;
+    if (namesIn(folder, status) >= status.st_nlink) continue;
+    lines.push_back(fmt::format(
+        "{} has another name outside its process folder, by a hard link: if other model runs write the same "
+        "file, those at the same time disturb each other. Let the model write a file of its own.",
+        path));
+  }
+  looksForHardLinks_ = lines.empty();
   return lines;
 }
 

@@ -19,6 +19,10 @@ class SharedTargets final {
   /// be examined; no more at the next call.
   std::vector<std::string> takeChanged();
 
+  /// One line for each of `files` below the process folder `folder` that has a name outside it, too, by a hard link
+  /// that the model has made; no more once there was any.
+  std::vector<std::string> takeHardLinked(const std::string& folder, std::span<const std::string> files);
+
  private:
   struct Target {
     std::string link;
@@ -28,6 +32,7 @@ class SharedTargets final {
 
   std::vector<Target> targets_;
   std::vector<std::string> problems_;
+  bool looksForHardLinks_ = false;
 };
 
 }  // namespace mirevo

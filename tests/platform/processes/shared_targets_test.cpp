@@ -45,5 +45,20 @@ TEST(SharedTargets, WhatChangesBehindALinkOutOfTheFolderIsToldOnce) {
   }
 }
 
+TEST(SharedTargets, AResultWithANameOutsideTheFolderIsToldOnce) {
+  const TemporaryFolder folder;
+  folder.write("copy/flow.csv", "");
+  folder.write("shared.csv", "");
+  const std::vector<std::string> files{"/flow.csv", "/peak.csv"};
+  SharedTargets targets(folder / "copy", {});
+  fs::create_hard_link(folder / "copy/flow.csv", folder / "copy/last.csv");
+  EXPECT_THAT(targets.takeHardLinked(folder / "copy", files), IsEmpty());
+  fs::create_hard_link(folder / "shared.csv", folder / "copy/peak.csv");
+  EXPECT_THAT(SharedTargets().takeHardLinked(folder / "copy", files), IsEmpty()) << "of one run at a time";
+  EXPECT_THAT(targets.takeHardLinked(folder / "copy", files),
+              testing::ElementsAre(StartsWith((folder / "copy/peak.csv") + " has another name outside")));
+  EXPECT_THAT(targets.takeHardLinked(folder / "copy", files), IsEmpty());
+}
+
 }  // namespace
 }  // namespace mirevo
