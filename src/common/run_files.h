@@ -29,7 +29,7 @@ struct ResultFileNames {
   RunFile simulatedValues;          ///< of each evaluation, where the task works with them
   RunFile record;                   ///< the account of the run
   RunFile failures;                 ///< why evaluations failed
-  RunFile pairs;                    ///< how many observations the first successful run and runs with fewer meet
+  RunFile pairs;                    ///< what the first successful run, and runs that differ from it, are judged by
   RunFile checksums;                ///< of the rows of the table of evaluations
   std::span<const RunFile> tables;  ///< in which the task gives what it found
 };

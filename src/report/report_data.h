@@ -88,7 +88,6 @@ struct ReportedBand {
   std::size_t insideCount = 0;       ///< those inside the band
 };
 
-/// The parameter covariance of a sensitivity analysis on the model scale, one entry per parameter that has a variance.
 /// A parameter without a variance, and why.
 struct ReportedLeftOut {
   std::string name;
@@ -97,6 +96,7 @@ struct ReportedLeftOut {
   bool operator==(const ReportedLeftOut&) const = default;
 };
 
+/// The parameter covariance of a sensitivity analysis on the model scale, one entry per parameter that has a variance.
 struct ReportedCovariance {
   std::vector<std::string> names;
   std::vector<double> estimate;

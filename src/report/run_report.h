@@ -18,10 +18,7 @@ std::optional<ReportData> buildReport(const RunConfig& config, const std::string
 bool writeReport(const RunConfig& config, const std::string& filePrefix, std::string& reason,
                  std::string_view temporaryEnding = kTemporaryEnding) noexcept;
 
-/// Whether the file is a report on a run of that task.
-bool isReportOf(const std::string& path, std::string_view task);
-
-/// Whether the file is a report on a run of that task.
+/// Whether the file is a report on a run of that task; `reason` says why it cannot be read.
 bool isReportOf(const std::string& path, std::string_view task, std::string& reason);
 
 }  // namespace mirevo

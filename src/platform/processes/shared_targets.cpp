@@ -17,9 +17,9 @@ namespace {
 
 namespace fs = std::filesystem;
 
-/// Entries looked at in the process folder, and behind each link.
+/// Entries looked at in the process folder, and behind each link; links of which that is done.
 constexpr int kMostEntries = 5000;
-constexpr std::size_t kMostLinks = 100;
+constexpr std::size_t kMostTargets = 100;
 
 /// Calls `visit` with the paths in a folder, not through links, until there are no more or too many. Returns the reason
 /// why it ended before, if it did.
@@ -66,7 +66,7 @@ SharedTargets::SharedTargets(const std::string& folder, std::span<const std::str
   const std::string root = resolvedPath(folder);
   const std::error_code failed = visitEntries(root, [&](const fs::directory_entry& entry) {
     std::error_code ignored;
-    if (targets_.size() == kMostLinks || !entry.is_symlink(ignored)) return;
+    if (targets_.size() == kMostTargets || !entry.is_symlink(ignored)) return;
     const std::string path = entry.path().string();
     auto link = findLeavingLink(root, std::string_view(path).substr(root.size()));
     if (link && !link->fault.empty()) problems_.push_back(describe(*link));

@@ -63,7 +63,7 @@ class RunResults final {
   void lockFailedRuns(RunLog& log);
   void startAfresh(const RunConfig& config, RunLog& log);
   void keepEarlierFiles(const RunConfig& config, RunLog& log) const;
-  /// Account, tables of failures and pairs, those of analyses.
+  /// Account, tables of failures, pairs and checksums, those of analyses.
   std::vector<std::string> pathsBesideResults() const;
   std::vector<std::string> bandPaths(const RunConfig& config) const;
   std::vector<std::string> earlierBands(RunLog& log) const;
