@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <iterator>
+#include <map>
 #include <set>
 #include <utility>
 
@@ -83,29 +84,29 @@ std::string keepEarlierFile(const std::string& path, RunLog& log) {
 }
 
 void keepEarlierResults(std::span<const std::string> paths, const std::string& setupFile, RunLog& log) {
-  std::vector<std::string> ofAnother;
-  std::string another;
+  std::map<std::string, std::vector<std::string>> ofOthers;  // by the setup that they name
+  std::string setup;  // also of a file without its name, which stands behind the results that it belongs to
   for (const std::string& path : paths) {
     const std::string kept = keepEarlierFile(path, log);
     if (kept.empty()) continue;
     std::string reason;
     const auto head = readFileHead(kept, reason);
-    const std::string earlier = head ? setupNamedIn(*head) : std::string();
     if (!head) {
       log.warning(
           fmt::format("{}, kept from an earlier run: {}. Whether it is of this setup is not known", kept, reason));
-    } else if (!earlier.empty() && !isSameSetup(earlier, setupFile)) {
-      another = earlier;
-      ofAnother.push_back(kept);
+      continue;
     }
+    if (std::string named = setupNamedIn(*head); !named.empty()) setup = std::move(named);
+    if (!setup.empty() && !isSameSetup(setup, setupFile)) ofOthers[setup].push_back(kept);
   }
-  if (!ofAnother.empty()) {
+  for (const auto& [other, kept] : ofOthers) {
     log.warning(
         fmt::format("Results of another setup, {}, had the names of this run's, and were kept as {}. Give one "
                     "of the setups another name",
-                    another, fmt::join(ofAnother, ", ")));
+                    other, fmt::join(kept, ", ")));
   }
 }
+
 void keepResultsOfAnother(const std::string& results, std::span<const std::string> paths, const std::string& setupFile,
                           RunLog& log) {
   const auto setupOf = [](const std::string& path) {

@@ -28,8 +28,8 @@ void logKept(const std::string& path, const std::string& kept, RunLog& log);
 /// keepEarlierFile() with logKept().
 std::string keepEarlierFile(const std::string& path, RunLog& log);
 
-/// The same for each of the results, with a warning if the heads of some name another setup, whose results then have
-/// moved.
+/// The same for each of the results, with a warning for each other setup that the heads of some name, whose results
+/// then have moved. A file without such a line belongs to the one before it.
 void keepEarlierResults(std::span<const std::string> paths, const std::string& setupFile, RunLog& log);
 
 /// The same for those of `paths` whose heads name another setup than that of `results`: a run that goes on would

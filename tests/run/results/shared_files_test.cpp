@@ -43,6 +43,12 @@ TEST(SharedFiles, KeptResultsOfAnotherSetupAreToldOfOnce) {
     for (const std::string& path : paths) EXPECT_FALSE(std::filesystem::exists(path));
     EXPECT_EQ(log.warningCount(), warnings) << named;
   }
+  RunLog log;
+  const std::vector<std::string> paths{folder.write("y.dat", "# Setup file: /a/one.kdx\n"), folder.write("y.bin", "v"),
+                                       folder.write("y_Run.dat", "# Setup file: /a/two.kdx\n")};
+  keepEarlierResults(paths, folder / "y.kdx", log);
+  EXPECT_THAT(log.warnings(), testing::ElementsAre(AllOf(HasSubstr("/a/one.kdx"), HasSubstr("y.1.bin. ")),
+                                                   AllOf(HasSubstr("/a/two.kdx"), HasSubstr("y_Run.1.dat. "))));
 }
 
 }  // namespace
