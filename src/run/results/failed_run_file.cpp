@@ -1,7 +1,5 @@
 #include "run/results/failed_run_file.h"
 
-#include <filesystem>
-#include <system_error>
 #include <utility>
 
 #include <fmt/core.h>
@@ -18,15 +16,6 @@ namespace mirevo {
 namespace {
 
 constexpr std::string_view kIndent = "   ";
-
-/// Makes `content` the file's, to be continued.
-void continueWith(RecordFile& file, const std::string& path, const std::string& content) {
-  std::string reason;
-  if (readFileIfThere(path) != content && !replaceFile(path, content, reason)) {
-    fatalError("Error: Unable to write to " + path, reason);
-  }
-  file.openToContinue(path);
-}
 
 }  // namespace
 
@@ -66,8 +55,8 @@ std::string FailedRunFile::continueBehind(std::span<const FailureRow> rows,
   std::string kept;
   if (readFileIfThere(paths_.forPeople) != records) kept = keepEarlierFile(paths_.forPeople);
   if (rows.empty() && !readFileIfThere(paths_.table)) return kept;  // they appear with the first failure
-  continueWith(table_, paths_.table, table);
-  continueWith(forPeople_, paths_.forPeople, records);
+  table_.openToContinue(paths_.table, table);
+  forPeople_.openToContinue(paths_.forPeople, records);
   return kept;
 }
 
@@ -107,26 +96,19 @@ std::string FailedRunFile::record(std::span<const double> parameterValues, const
 }
 
 std::vector<std::string> removeFailedRunFolders(const std::string& prefix, const std::set<int>& numbers) {
-  const std::filesystem::path first(prefix);
-  const std::string beginning = first.filename().string();
   std::vector<std::string> problems;
-  std::error_code failed;
-  std::filesystem::directory_iterator entry(first.parent_path(), failed);
-  for (; !failed && entry != std::filesystem::directory_iterator(); entry.increment(failed)) {
-    const std::string name = entry->path().filename().string();
-    if (!name.starts_with(beginning)) continue;
-    const std::string digits = name.substr(beginning.size());
+  for (const auto& [path, digits] : numberedEntries(prefix, {})) {
     const auto number = parseInteger(digits);
     const bool isMade = number && std::to_string(*number) == digits;
     if (!isMade || numbers.count(*number) > 0) continue;
-    if (const auto why = whyNotReplaceable(entry->path().string(), run_files::kFailedFolder); !why.empty()) {
-      problems.push_back(fmt::format("{} was not removed. {}", entry->path().string(), why));
+    if (const auto why = whyNotReplaceable(path, run_files::kFailedFolder); !why.empty()) {
+      problems.push_back(fmt::format("{} was not removed. {}", path, why));
       continue;
     }
     try {
-      removeTree(entry->path().string());
+      removeTree(path);
     } catch (const FatalError& error) {
-      problems.push_back(fmt::format("{} was not removed: {}", entry->path().string(), error.message()));
+      problems.push_back(fmt::format("{} was not removed: {}", path, error.message()));
     }
   }
   return problems;

@@ -9,7 +9,6 @@
 
 #include "common/calendar.h"
 #include "common/data_table.h"
-#include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/text.h"
 #include "run/results/series_table.h"
@@ -141,13 +140,9 @@ EarlierPairs PairsFile::readEarlier() const {
 }
 
 void PairsFile::continueBehind(PairsByNumber earlier) {
-  const auto present = readFileIfThere(path_);
-  if (earlier.empty() && !present) return;
+  if (earlier.empty() && !readFileIfThere(path_)) return;
   pairs_ = std::move(earlier);
-  const std::string text = pairsTableText(tableHead_, pairs_);
-  std::string reason;
-  if (present != text && !replaceFile(path_, text, reason)) fatalError("Error: Unable to write to " + path_, reason);
-  file_.openToContinue(path_);
+  file_.openToContinue(path_, pairsTableText(tableHead_, pairs_));
 }
 
 void PairsFile::add(int number, std::span<const MeasurePairs> pairs) {

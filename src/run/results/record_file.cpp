@@ -4,7 +4,9 @@
 #include <cstdio>
 #include <cstring>
 #include <fcntl.h>
+#include <filesystem>
 #include <sys/stat.h>
+#include <system_error>
 #include <unistd.h>
 #include <utility>
 
@@ -14,6 +16,7 @@
 #include "common/fatal_error.h"
 #include "common/file_copy.h"
 #include "common/files.h"
+#include "common/take_text.h"
 #include "platform/signals/signal_state.h"
 
 namespace mirevo {
@@ -54,6 +57,14 @@ void RecordFile::openToContinue(const std::string& path) {
   struct stat status {};
   if (::fstat(descriptor_, &status) != 0) fatalError("Error: Unable to open " + path, std::strerror(errno));
   size_ = status.st_size;
+}
+
+void RecordFile::openToContinue(const std::string& path, const std::string& content) {
+  std::string reason;
+  if (readFileIfThere(path) != content && !replaceFile(path, content, reason)) {
+    fatalError("Error: Unable to write to " + path, reason);
+  }
+  openToContinue(path);
 }
 
 void RecordFile::openWith(const std::string& path, int flags) {
@@ -102,6 +113,22 @@ bool RecordFile::tryClose(std::string& reason) {
   if (descriptor < 0 || ::close(descriptor) == 0 || errno == EINTR) return true;
   reason = std::strerror(errno);
   return false;
+}
+
+std::vector<NumberedEntry> numberedEntries(const std::string& prefix, std::string_view extension) {
+  const std::filesystem::path beginning(prefix);
+  const std::string stem = beginning.filename().string();
+  std::vector<NumberedEntry> entries;
+  std::error_code failed;
+  std::filesystem::directory_iterator entry(beginning.parent_path(), failed);
+  for (; !failed && entry != std::filesystem::directory_iterator(); entry.increment(failed)) {
+    const std::string name = entry->path().filename().string();
+    std::string_view digits = name;
+    if (!takeText(digits, stem) || !digits.ends_with(extension)) continue;
+    digits.remove_suffix(extension.size());
+    if (isDigits(digits)) entries.push_back({entry->path().string(), std::string(digits)});
+  }
+  return entries;
 }
 
 std::string keepEarlierFile(const std::string& path) {

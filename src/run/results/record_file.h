@@ -3,6 +3,7 @@
 #include <cstdint>
 #include <string>
 #include <string_view>
+#include <vector>
 
 namespace mirevo {
 
@@ -20,6 +21,9 @@ class RecordFile final {
 
   /// Opens the file to append to its content. Throws FatalError with the system's reason.
   void openToContinue(const std::string& path);
+
+  /// The same after making `content` the file's, as a whole, unless it is already. Throws FatalError.
+  void openToContinue(const std::string& path, const std::string& content);
 
   /// Appends `record` unchanged, line ends included. Throws FatalError with the system's reason, once: after a failure
   /// further records are dropped.
@@ -48,6 +52,14 @@ class RecordFile final {
   std::int64_t size_ = 0;
   bool failed_ = false;
 };
+
+/// Something whose name is `prefix`, digits and `extension`.
+struct NumberedEntry {
+  std::string path;
+  std::string digits;
+};
+/// All of them, in the system's order.
+std::vector<NumberedEntry> numberedEntries(const std::string& prefix, std::string_view extension);
 
 /// Keeps an earlier run's file or folder from being overwritten: renames `path` to the first free of
 /// `<stem>.1<ending>`, `<stem>.2<ending>` ..., or of `<name>.1` ... for a folder, and returns that name; empty if there

@@ -77,9 +77,7 @@ void RowChecksumFile::open(std::span<const RowChecksum> earlier) {
     file_.append(text({}));
     return;
   }
-  std::string reason;
-  if (!replaceFile(path_, text(earlier), reason)) fatalError("Error: Unable to write to " + path_, reason);
-  file_.openToContinue(path_);
+  file_.openToContinue(path_, text(earlier));
 }
 
 void RowChecksumFile::add(const RowChecksum& row) {

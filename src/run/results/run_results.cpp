@@ -13,7 +13,6 @@
 #include "common/files.h"
 #include "common/replaceable_files.h"
 #include "common/run_files.h"
-#include "common/take_text.h"
 #include "common/text.h"
 #include "common/version.h"
 #include "evaluation/run_comparison.h"
@@ -160,18 +159,9 @@ void RunResults::writeTables(std::span<const DataTable> tables, RunLog& log) con
 
 /// Those of every measure that earlier runs had.
 std::vector<std::string> RunResults::earlierBands(RunLog& log) const {
-  const std::filesystem::path beginning(runFilePath(filePrefix_, run_files::kBand));
-  const std::string stem = beginning.filename().string();
   std::vector<std::string> paths;
-  std::error_code failed;
-  std::filesystem::directory_iterator entry(beginning.parent_path(), failed);
-  for (; !failed && entry != std::filesystem::directory_iterator(); entry.increment(failed)) {
-    const std::string name = entry->path().filename().string();
-    std::string_view number = name;
-    if (!takeText(number, stem) || !number.ends_with(run_files::kBand.extension)) continue;
-    number.remove_suffix(run_files::kBand.extension.size());
-    const std::string path = entry->path().string();
-    if (!isDigits(number)) continue;
+  const std::string beginning = runFilePath(filePrefix_, run_files::kBand);
+  for (const auto& [path, digits] : numberedEntries(beginning, run_files::kBand.extension)) {
     std::string reason;
     const auto head = readFileHead(path, reason);
     if (!head) log.warning(fmt::format("{}: {}. It may be a band of an earlier run, and is not kept", path, reason));
