@@ -12,6 +12,7 @@
 #include "common/text.h"
 #include "run/access/file_validation.h"
 #include "run/tasks/infeasible_sets.h"
+#include "run/tasks/off_grid.h"
 
 namespace mirevo {
 namespace {
@@ -103,12 +104,11 @@ void warnOffGrid(const ModelParameter& parameter, std::span<const double> values
   const auto isOff = [&parameter](double value) { return !isOnGrid(parameter, value); };
   const auto first = std::find_if(values.begin(), values.end(), isOff);
   if (first == values.end()) return;
-  section.warn(
-      kInitialSampleFileKeyword,
-      fmt::format("{} of the {} values of the integer parameter {} are not whole numbers of steps above "
-                  "Lower_Bound = {}; of the first, {}, {} is taken",
-                  std::count_if(first, values.end(), isOff), values.size(), quotedForMessage(parameter.name),
-                  formatReal(parameter.lowerBound), formatReal(*first), formatReal(onGrid(parameter, *first))));
+  const auto count = std::count_if(first, values.end(), isOff);
+  section.warn(kInitialSampleFileKeyword,
+               fmt::format("{} of the {} values of the integer parameter {} {} between its steps: {} {}", count,
+                           values.size(), quotedForMessage(parameter.name), count == 1 ? "is" : "are",
+                           formatReal(*first), offGridText(parameter, *first)));
 }
 
 }  // namespace

@@ -237,8 +237,8 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatAreSeldomMeant)
        "Initial_Sample_File_Name: its 2 sets are the same: a search proposes nothing else among equal points"},
       {"Initial_Sample_File_Name = 'sample.txt' => 'steps.txt' & Transformation_Type = 1 => 2 & "
        "Initial_Value = 412.5 => 412",
-       "Initial_Sample_File_Name: 1 of the 3 values of the integer parameter \"Depth\" are not whole numbers of steps "
-       "above Lower_Bound = 100; of the first, 200.5, 200 is taken\n"},
+       "Initial_Sample_File_Name: 1 of the 3 values of the integer parameter \"Depth\" is between its steps: 200.5 is "
+       "not a whole number of steps above Lower_Bound = 100, 200 is taken\n"},
       {"Left_Equation = 'Rate' => '(Rate) < Depth' & Right_Equation = 'Depth' => '3'",
        "setup.kdx:51:25: Left_Equation: the value of a comparison is 0 or 1, with which this constraint is always "
        "met: "},
