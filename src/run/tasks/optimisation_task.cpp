@@ -148,6 +148,7 @@ void OptimisationTask::read(const TaskReading& reading) {
   const SetupSection sample = section.open(nameInside(initialSampleSection().row));
   InitialSampleSection filled{initialSample, randomSeed};
   sample.read(initialSampleSection(), filled);
+  warnOfUnusedSample(sample);
   if (initialSample.generation == SampleGeneration::fromFile) {
     validateFileOpens(initialSample.fileName, kInitialSampleFileKeyword, sample);
     if (method->facts().drawsInitialSample) takeGivenValues(reading, sample);
@@ -160,6 +161,17 @@ void OptimisationTask::read(const TaskReading& reading) {
   const SetupSection stops = section.open(nameInside(stoppingSection().row));
   readStopping(stops, reading.variableCount);
   if (surrogateUse == SurrogateUse::yes) readSurrogate(reading, section, stops);
+}
+
+/// A setup that names no way of drawing means none in particular.
+void OptimisationTask::warnOfUnusedSample(const SetupSection& section) const {
+  constexpr std::string_view kKeyword = "Initial_Sample_Generation";
+  const bool isWanted = initialSample.generation != SampleGeneration::uniformRandom && section.isWritten(kKeyword);
+  if (method->facts().drawsInitialSample || !isWanted) return;
+  section.warn(kKeyword, fmt::format("{} has no effect: {} {}", static_cast<int>(initialSample.generation),
+                                     method->facts().longName,
+                                     method->evaluatesSample(initialSample) ? "draws its start points uniformly"
+                                                                            : "starts from the initial values alone"));
 }
 
 /// The values of the sample file, which runs get exactly.

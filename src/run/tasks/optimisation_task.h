@@ -42,6 +42,7 @@ class OptimisationTask final : public Task {
  private:
   /// Whether a surrogate model assists the search.
   bool usesSurrogate() const { return surrogateUse == SurrogateUse::yes && method->facts().usesSurrogate; }
+  void warnOfUnusedSample(const SetupSection& section) const;
   void takeGivenValues(const TaskReading& reading, const SetupSection& section);
   void readMethod(const TaskReading& reading, const SetupSection& section) const;
   void readStopping(const SetupSection& section, std::size_t variableCount);

@@ -264,8 +264,14 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatAreSeldomMeant)
        "setup.kdx:28:21: Upper_Bound: the bounds leave one value to every variable parameter: all sets of the search "
        "are the same"},
       {"Algorithm_Type = 1 => 2 & Use_Surrogate_Model = 1 => 0 & Initial_Value = 412.5 => 100 & Upper_Bound = 900 => "
-       "100 & NoSimultaneousSim = 4 => 1",
+       "100 & NoSimultaneousSim = 4 => 1 & Initial_Sample_Generation = 4 => 0 & 'sample.txt' => ''",
        ""},
+      {"Algorithm_Type = 1 => 2 & Use_Surrogate_Model = 1 => 0 & NoSimultaneousSim = 4 => 1",
+       "Initial_Sample_Generation: 4 has no effect: Dynamically Dimensioned Search starts from the initial values "
+       "alone"},
+      {"Algorithm_Type = 1 => 2 & Use_Surrogate_Model = 1 => 0 & NoSimultaneousSim = 4 => 1 & "
+       "Include_Initial_Parameters = 1 => 0",
+       "4 has no effect: Dynamically Dimensioned Search draws its start points uniformly"},
       {"TqSEKdxListItemCount = 1 // files => TqSEKdxListItemCount = 2\n[SIMPARAMITEM_2]\nParamFileName = "
        "'model/soil.par'\nTemplateFileName = 'model/soil.tpl'\n[/SIMPARAMITEM_2]",
        "setup.kdx:14:17: ParamFileName: SIMPARAMITEM_1 writes this file, too; the model gets what is written last, "
