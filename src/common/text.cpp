@@ -97,6 +97,11 @@ std::string formatReal(double value) {
   return fmt::format("{}", value);
 }
 
+std::string countText(std::size_t count, std::string_view one, std::string_view more) {
+  if (count == 1) return fmt::format("1 {}", one);
+  return more.empty() ? fmt::format("{} {}s", count, one) : fmt::format("{} {}", count, more);
+}
+
 std::string withNumber(std::string_view text, std::int64_t number) {
   std::string result(text);
   if (const auto position = result.find('%'); position != std::string::npos) {

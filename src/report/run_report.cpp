@@ -16,6 +16,7 @@
 #include "common/files.h"
 #include "common/replaceable_files.h"
 #include "common/run_files.h"
+#include "common/text.h"
 #include "common/version.h"
 #include "evaluation/chosen_evaluations.h"
 #include "evaluation/run_comparison.h"
@@ -99,7 +100,7 @@ ReportData ReportBuilder::build() {
   if (table.unusableLines > 0 && sources_.stage != RunStage::running) {
     const bool isOne = table.unusableLines == 1;
     note(fmt::format("{} of the result file {} cut off or damaged and left out.",
-                     isOne ? "1 line" : fmt::format("{} lines", table.unusableLines), isOne ? "is" : "are"));
+                     countText(table.unusableLines, "line"), isOne ? "is" : "are"));
   }
   noteChangedSetup();
   if (!table.hasExpectedColumns) {
@@ -130,8 +131,7 @@ void ReportBuilder::noteRowFaults() {
     lines += fmt::format("{}{}", i == 0 ? "" : "; ", rowFaultText(faults[i]));
   }
   if (faults.size() > kMostShown) lines += fmt::format("; and {} more", faults.size() - kMostShown);
-  note(fmt::format("{} of the result file {} not hold, but {} shown: {}.",
-                   faults.size() == 1 ? "1 row" : fmt::format("{} rows", faults.size()),
+  note(fmt::format("{} of the result file {} not hold, but {} shown: {}.", countText(faults.size(), "row"),
                    faults.size() == 1 ? "does" : "do", faults.size() == 1 ? "is" : "are", lines));
 }
 

@@ -11,6 +11,7 @@
 #include "algorithms/numbers/lapack.h"
 #include "algorithms/numbers/sample_summary.h"
 #include "common/run_files.h"
+#include "common/text.h"
 
 namespace mirevo {
 
@@ -332,13 +333,9 @@ DataTable jacobianTable(const LinearisedModel& model, const SearchSpace& space,
 std::vector<std::string> formatCovariance(const ParameterCovariance& covariance, const SearchSpace& space,
                                           std::span<const double> set, std::string_view filePrefix) {
   std::vector<std::string> lines;
-  const auto counted = [](std::size_t count, const char* one, const char* more) {
-    return fmt::format("{} {}", count, count == 1 ? one : more);
-  };
-  lines.push_back(fmt::format("Parameter covariance: {}, {}, {}",
-                              counted(covariance.observationCount, "observation", "observations"),
-                              counted(covariance.kept.size(), "parameter", "parameters"),
-                              counted(covariance.degreesOfFreedom, "degree of freedom", "degrees of freedom")));
+  lines.push_back(fmt::format("Parameter covariance: {}, {}, {}", countText(covariance.observationCount, "observation"),
+                              countText(covariance.kept.size(), "parameter"),
+                              countText(covariance.degreesOfFreedom, "degree of freedom", "degrees of freedom")));
   for (const LeftOutParameter& parameter : covariance.leftOut) {
     lines.push_back(fmt::format("Warning: Parameter {} is left out of the covariance matrix: {}",
                                 space.names[parameter.index], parameter.reason));
@@ -350,7 +347,7 @@ std::vector<std::string> formatCovariance(const ParameterCovariance& covariance,
   }
   if (covariance.withoutDerivative > 0) {
     lines.push_back(fmt::format("Warning: {} left out of the covariance matrix: a perturbed run has no value there",
-                                counted(covariance.withoutDerivative, "observation is", "observations are")));
+                                countText(covariance.withoutDerivative, "observation is", "observations are")));
   }
   lines.push_back(fmt::format("Standard error of a residual: {:.6g}", std::sqrt(covariance.errorVariance)));
   for (std::string& line : lagOneLines(covariance.lagOne)) lines.push_back(std::move(line));

@@ -239,6 +239,8 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatAreSeldomMeant)
        "Initial_Value = 412.5 => 412",
        "Initial_Sample_File_Name: 1 of the 3 values of the integer parameter \"Depth\" is between its steps: 200.5 is "
        "not a whole number of steps above Lower_Bound = 100, 200 is taken\n"},
+      {"TqSEKdxListItemCount = 1\n      [CONSTRAINT_1] => TqSEKdxListItemCount = 0\n      [CONSTRAINT_1]",
+       "TqSEKdxListItemCount: 1 section CONSTRAINT_n is here, those beyond 0 are not read: CONSTRAINT_1"},
       {"Left_Equation = 'Rate' => '(Rate) < Depth' & Right_Equation = 'Depth' => '3'",
        "setup.kdx:51:25: Left_Equation: the value of a comparison is 0 or 1, with which this constraint is always "
        "met: "},
