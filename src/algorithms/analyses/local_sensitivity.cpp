@@ -188,7 +188,9 @@ void noteFailures(PerturbationPlan& plan, std::span<const EvaluationResult> resu
     const bool hasAbove = results[difference.plus].ok();
     if (!difference.problem.empty() || (hasBelow && hasAbove)) continue;
     const EvaluationResult& failed = results[hasBelow ? difference.plus : difference.minus];
-    const std::string reason = fmt::format("evaluation {} failed: {}", failed.number, failed.failure->reason);
+    const bool isMade = failed.failure->kind != EvaluationFailure::Kind::notMade;
+    const std::string reason =
+        fmt::format("evaluation {} {}: {}", failed.number, isMade ? "failed" : "was not made", failed.failure->reason);
     const double width = hasBelow ? difference.widthBelow : difference.widthAbove;
     if (!difference.isCentral() || hasBelow == hasAbove || !results.front().ok() || !(std::abs(width) > 0.0)) {
       difference.problem = reason;
@@ -464,6 +466,7 @@ std::optional<LinearisedModel> linearise(const PerturbationPlan& plan,
   model.jacobian = differenceColumns(plan, simulatedValues);
   for (const ParameterDifference& difference : plan.differences) {
     model.widths.push_back(difference.width);
+    model.problems.push_back(difference.problem);
     const std::vector<double>& minus = simulatedValues[difference.minus];
     const std::vector<double>& plus = simulatedValues[difference.plus];
     std::vector<bool>& oneSided = model.oneSided.emplace_back(base.size());

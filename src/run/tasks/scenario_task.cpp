@@ -135,7 +135,7 @@ std::string ScenarioTask::description() const {
                                                   : "Scenario runs: Multiple runs";
 }
 
-int ScenarioTask::plannedEvaluations(std::size_t /*variableCount*/) const {
+int ScenarioTask::plannedEvaluations() const {
   return settings.type == ScenarioType::singleRun ? 1 : static_cast<int>(settings.runs.size());
 }
 
