@@ -307,11 +307,14 @@ void ReportBuilder::addSeries() {
     note(fmt::format("The series of the initial evaluation are not shown: {} does not have them.", source.file));
   }
   const std::optional<ShownEvaluation>& best = data_.series.best;
-  if (best && best_ != nullptr && best->number != best_->number) {
-    note(
-        fmt::format("The series shown as best are those of evaluation {}: the file of the series has not been written "
-                    "since evaluation {}, which is better, was found.",
-                    best->number, best_->number));
+  if (!best || best_ == nullptr || best->number == best_->number) return;
+  const std::string shownAsBest = fmt::format("The series shown as best are those of evaluation {}", best->number);
+  if (rowOf(best->number) == nullptr) {
+    note(fmt::format("{}, which the result file does not hold; the best that it holds is evaluation {}.", shownAsBest,
+                     best_->number));
+  } else {
+    note(fmt::format("{}: the file of the series has not been written since evaluation {}, which is better, was found.",
+                     shownAsBest, best_->number));
   }
 }
 
@@ -328,6 +331,9 @@ void ReportBuilder::addAnalyses() {
   if (task.sensitivity != nullptr) {
     data_.sensitivity = reportedSensitivity(config_, *task.sensitivity, space(), sources_.results.rows, pairsOfRuns());
   }
+  std::string fault;
+  if (data_.sensitivity && hasAnalysis) fault = takeSensitivities(filePrefix_, *data_.sensitivity);
+  // The table that the run has written is of its own sets.
   if (data_.sensitivity && !data_.sensitivity->ofOtherSets.empty()) {
     note(
         fmt::format("Evaluations of other parameter sets than a sensitivity analysis of the setup, as it is now, would "
@@ -341,7 +347,6 @@ void ReportBuilder::addAnalyses() {
                      config_.plannedEvaluations()));
   }
   if (!data_.sensitivity || !hasAnalysis) return;
-  std::string fault = takeSensitivities(filePrefix_, *data_.sensitivity);
   if (!fault.empty()) {
     note(fmt::format("The derivatives, and the ranking by them, are computed again from the result file: {}.", fault));
   }
