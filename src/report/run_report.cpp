@@ -28,7 +28,6 @@
 #include "report/report_parameters.h"
 #include "report/run_sources.h"
 #include "run/results/restart_settings.h"
-#include "run/results/shared_files.h"
 #include "run/setup/setup_summary.h"
 
 namespace mirevo {
@@ -91,8 +90,9 @@ ReportData ReportBuilder::build() {
   data_.periodFirst = secondNumber(config_.period.start);
   data_.periodLast = secondNumber(config_.period.end);
   addRun();
-  if (!sources_.setup.empty() && !isSameSetup(sources_.setup, config_.setupFile)) {
-    note(fmt::format("The results name another setup, {}.", sources_.setup));
+  if (sources_.isOfOtherSetup) {
+    note(fmt::format("The results name another setup, {}. They are of that one, unless this is its new name.",
+                     sources_.setup));
   }
   if (!sources_.recordFault.empty()) {
     note(fmt::format("How the run ended is taken from its results alone: {}.", sources_.recordFault));
@@ -104,7 +104,10 @@ ReportData ReportBuilder::build() {
   }
   noteChangedSetup();
   if (!table.hasExpectedColumns) {
-    if (table.hasHeader) note("The results are left out: they have other columns than the setup as it is now.");
+    if (table.hasHeader) {
+      note(fmt::format("The results are left out: they have other columns than {}.",
+                       sources_.isOfOtherSetup ? "this setup" : "the setup as it is now"));
+    }
     table.rows.clear();
   }
   noteRowFaults();
@@ -183,7 +186,10 @@ void ReportBuilder::noteChangedSetup() {
   std::string text;
   for (std::size_t i = 0; i < std::min(changes.size(), kMostChanges); ++i) text += (i == 0 ? "" : "; ") + changes[i];
   if (changes.size() > kMostChanges) text += fmt::format("; and {} more", changes.size() - kMostChanges);
-  note(fmt::format("The setup was changed since: {}. The report has what the setup says now.", text));
+  note(fmt::format(
+      "{}: {}. The report has what the setup says now.",
+      sources_.isOfOtherSetup ? "This setup is another one than that of the results" : "The setup was changed since",
+      text));
 }
 
 void ReportBuilder::addEvaluations() {

@@ -235,6 +235,10 @@ TEST(Report, SaysWhatIsMissingInItsFilesAndIsNotMadeOfWhatIsNotThere) {
       makeReport(folder).error,
       HasSubstr("basin.dat: these are results of another task (uncertainty analysis), and the setup now selects "
                 "scenario runs. For their report, set Option = 3 again"));
+  const std::string results = folder.read("basin.dat");
+  folder.write("basin.dat", std::string(results).replace(results.find("basin.kdx"), 5, "other"));
+  EXPECT_THAT(makeReport(folder).error, HasSubstr("basin.dat: it is of another setup, " + folder / "other.kdx"));
+  folder.write("basin.dat", results);
   folder.editSetup("Option = 0", "Option = 3");
   cutTo("basin.dat", folder.read("basin.dat").find("\n1\tOK") + 1);
   const ProgramResult ofNone = makeReport(folder);
