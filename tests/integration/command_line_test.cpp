@@ -75,6 +75,8 @@ TEST(CommandLine, AMissingSetupFileIsNamedOnStandardErrorAndInTheLog) {
   folder.write("meant.kdx", "");
   folder.write("meant.log", "of the run");
   EXPECT_THAT(runProgram({(folder / "meant")}).error, HasSubstr("did you mean " + (folder / "meant.kdx") + "?"));
+  EXPECT_THAT(runProgram({(folder / "meant.kdx/")}).error, HasSubstr("Unable to open " + (folder / "meant.kdx/\n") +
+                                                                     (folder / "meant.kdx is a file and no folder")));
   EXPECT_EQ(folder.read("meant.log"), "of the run");
   EXPECT_FALSE(folder.exists("meant._spi_"));
 

@@ -158,6 +158,8 @@ std::string nearestCode(std::span<const CodeName> codes, std::string_view writte
   const bool isOperator = std::find(names.begin(), names.end(), "<=") != names.end();
   if (isOperator && (written == "==" || written == "="))
     return "; what must be equal needs two constraints, '<=' and '>='";
+  if (isOperator && (written == "<>" || written == "><" || written == "!="))
+    return "; what must differ needs the equation abs(left - right) and '>' 0";
   const auto nearest = nearestName(written, names);
   return nearest ? fmt::format(", did you mean '{}'?", *nearest) : "";
 }
