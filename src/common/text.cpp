@@ -140,7 +140,10 @@ std::optional<std::string> nearestName(std::string_view name, std::span<const st
     if (lengthGap > nearestDistance) continue;
     // Of equally near ones that of the same length: "=<" is "<=" rather than "<".
     const std::size_t distance = editDistance(name, candidate);
-    if (distance > limit || std::pair(distance, lengthGap) >= std::pair(nearestDistance, nearestGap)) continue;
+    const bool haveNothingInCommon = distance == std::max(name.size(), candidate.size());
+    if (distance > limit || haveNothingInCommon ||
+        std::pair(distance, lengthGap) >= std::pair(nearestDistance, nearestGap))
+      continue;
     nearest = candidate;
     nearestDistance = distance;
     nearestGap = lengthGap;

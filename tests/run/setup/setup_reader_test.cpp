@@ -60,6 +60,8 @@ TEST_F(SetupReaderTest, RefusesWhatCannotBeReadAndSaysWhere) {
       {"Max_No_Evaluations = 500 => 2147483648", "STOPPING_CRITERIA",
        "146:28: Max_No_Evaluations: expected an integer within 32 bits, found 2147483648"},
       {"Option = 2 => 2, 3", "MIREVO_SIMULATION_OPTION", "3:17: Option: expected one value, found 2"},
+      {"Initial_Value = 412.5 => 412,5", "PARAMETER_1",
+       "26:27: Initial_Value: expected one value, found 2: numbers have a decimal point, a comma separates values"},
       {"'Upper catchment   ' => 2001-01-31", "MIREVO_SIMULATION_OPTION",
        "4:13: Title: expected a text between quotes, found the date 2001-01-31 00:00"},
       {title(longText), "MIREVO_SIMULATION_OPTION", "4:13: Title: expected a text of at most 255 bytes, found 256"},
