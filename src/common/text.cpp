@@ -97,6 +97,11 @@ std::string formatReal(double value) {
   return fmt::format("{}", value);
 }
 
+std::string countText(std::size_t count, std::string_view one, std::string_view more) {
+  if (count == 1) return fmt::format("1 {}", one);
+  return more.empty() ? fmt::format("{} {}s", count, one) : fmt::format("{} {}", count, more);
+}
+
 std::string withNumber(std::string_view text, std::int64_t number) {
   std::string result(text);
   if (const auto position = result.find('%'); position != std::string::npos) {
@@ -135,7 +140,10 @@ std::optional<std::string> nearestName(std::string_view name, std::span<const st
     if (lengthGap > nearestDistance) continue;
     // Of equally near ones that of the same length: "=<" is "<=" rather than "<".
     const std::size_t distance = editDistance(name, candidate);
-    if (distance > limit || std::pair(distance, lengthGap) >= std::pair(nearestDistance, nearestGap)) continue;
+    const bool haveNothingInCommon = distance == std::max(name.size(), candidate.size());
+    if (distance > limit || haveNothingInCommon ||
+        std::pair(distance, lengthGap) >= std::pair(nearestDistance, nearestGap))
+      continue;
     nearest = candidate;
     nearestDistance = distance;
     nearestGap = lengthGap;

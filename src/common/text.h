@@ -33,6 +33,9 @@ std::optional<std::int32_t> parseInteger(std::string_view text);
 /// finite).
 std::string formatReal(double value);
 
+/// "1 pair", "9 pairs"; `more` is the plural where that is not `one` with an s.
+std::string countText(std::size_t count, std::string_view one, std::string_view more = {});
+
 /// For fixed texts with a number in them: `text` with its first "%" replaced by `number`.
 std::string withNumber(std::string_view text, std::int64_t number);
 

@@ -13,7 +13,7 @@ struct KindNames {
 };
 
 /// In the order of the kinds. The keys are used in files and never change; the names are for people.
-constexpr std::array<KindNames, 13> kKinds = {{
+constexpr std::array<KindNames, 14> kKinds = {{
     {"constraintsViolated", "parameter constraints violated"},
     {"equationNotFinite", "equation without a finite value"},
     {"valueNotWritable", "value that cannot be written in its field"},
@@ -27,6 +27,7 @@ constexpr std::array<KindNames, 13> kKinds = {{
     {"resultsCutOff", "results cut off"},
     {"tooFewPairs", "too few pairs of simulated and observed values"},
     {"notKnown", "reason not known any more"},
+    {"notMade", "not made"},
 }};
 
 }  // namespace

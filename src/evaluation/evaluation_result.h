@@ -31,6 +31,7 @@ struct EvaluationFailure {
     resultsCutOff,
     tooFewPairs,
     notKnown,  ///< failed in an earlier run, whose evidence is gone
+    notMade,   ///< the run ended before it; never in files
   };
   Kind kind = Kind::exitCode;
   std::string reason;                   ///< one line for a person

@@ -38,11 +38,6 @@ std::string rangeText(std::string_view what, const ValueSummary& range) {
   return fmt::format("{} {:.6g} to {:.6g}, mean {:.6g}", what, range.least, range.largest, range.mean);
 }
 
-/// "1 pair", "9 pairs"
-std::string countText(std::size_t count, std::string_view what) {
-  return fmt::format("{} {}{}", count, what, count == 1 ? "" : "s");
-}
-
 std::string hoursText(std::int64_t seconds) {
   return fmt::format("{:.6g} hour{}", static_cast<double>(seconds) / 3600.0, seconds == 3600 ? "" : "s");
 }

@@ -199,8 +199,8 @@ void addPeakStatistics(const SeriesItem& simulation, const SeriesItem& observati
 void requireItem(TimeSeriesObject& series, const SeriesReference& reference) {
   const std::string name(trimTrailing(reference.fileName));
   if (reference.itemNo < 1 || reference.itemNo > series.itemCount()) {
-    std::string detail = reference.itemLocation +
-                         fmt::format("the file has {} item{}", series.itemCount(), series.itemCount() == 1 ? "" : "s");
+    std::string detail =
+        reference.itemLocation + "the file has " + countText(static_cast<std::size_t>(series.itemCount()), "item");
     constexpr int kMostNames = 20;
     for (int item = 1; item <= std::min(series.itemCount(), kMostNames); ++item) {
       detail += fmt::format("\n{}: {}", item, series.itemName(item));

@@ -16,6 +16,7 @@
 #include "common/files.h"
 #include "common/replaceable_files.h"
 #include "common/run_files.h"
+#include "common/text.h"
 #include "common/version.h"
 #include "evaluation/chosen_evaluations.h"
 #include "evaluation/run_comparison.h"
@@ -27,7 +28,6 @@
 #include "report/report_parameters.h"
 #include "report/run_sources.h"
 #include "run/results/restart_settings.h"
-#include "run/results/shared_files.h"
 #include "run/setup/setup_summary.h"
 
 namespace mirevo {
@@ -90,8 +90,9 @@ ReportData ReportBuilder::build() {
   data_.periodFirst = secondNumber(config_.period.start);
   data_.periodLast = secondNumber(config_.period.end);
   addRun();
-  if (!sources_.setup.empty() && !isSameSetup(sources_.setup, config_.setupFile)) {
-    note(fmt::format("The results name another setup, {}.", sources_.setup));
+  if (sources_.isOfOtherSetup) {
+    note(fmt::format("The results name another setup, {}. They are of that one, unless this is its new name.",
+                     sources_.setup));
   }
   if (!sources_.recordFault.empty()) {
     note(fmt::format("How the run ended is taken from its results alone: {}.", sources_.recordFault));
@@ -99,11 +100,14 @@ ReportData ReportBuilder::build() {
   if (table.unusableLines > 0 && sources_.stage != RunStage::running) {
     const bool isOne = table.unusableLines == 1;
     note(fmt::format("{} of the result file {} cut off or damaged and left out.",
-                     isOne ? "1 line" : fmt::format("{} lines", table.unusableLines), isOne ? "is" : "are"));
+                     countText(table.unusableLines, "line"), isOne ? "is" : "are"));
   }
   noteChangedSetup();
   if (!table.hasExpectedColumns) {
-    if (table.hasHeader) note("The results are left out: they have other columns than the setup as it is now.");
+    if (table.hasHeader) {
+      note(fmt::format("The results are left out: they have other columns than {}.",
+                       sources_.isOfOtherSetup ? "this setup" : "the setup as it is now"));
+    }
     table.rows.clear();
   }
   noteRowFaults();
@@ -130,8 +134,7 @@ void ReportBuilder::noteRowFaults() {
     lines += fmt::format("{}{}", i == 0 ? "" : "; ", rowFaultText(faults[i]));
   }
   if (faults.size() > kMostShown) lines += fmt::format("; and {} more", faults.size() - kMostShown);
-  note(fmt::format("{} of the result file {} not hold, but {} shown: {}.",
-                   faults.size() == 1 ? "1 row" : fmt::format("{} rows", faults.size()),
+  note(fmt::format("{} of the result file {} not hold, but {} shown: {}.", countText(faults.size(), "row"),
                    faults.size() == 1 ? "does" : "do", faults.size() == 1 ? "is" : "are", lines));
 }
 
@@ -183,7 +186,10 @@ void ReportBuilder::noteChangedSetup() {
   std::string text;
   for (std::size_t i = 0; i < std::min(changes.size(), kMostChanges); ++i) text += (i == 0 ? "" : "; ") + changes[i];
   if (changes.size() > kMostChanges) text += fmt::format("; and {} more", changes.size() - kMostChanges);
-  note(fmt::format("The setup was changed since: {}. The report has what the setup says now.", text));
+  note(fmt::format(
+      "{}: {}. The report has what the setup says now.",
+      sources_.isOfOtherSetup ? "This setup is another one than that of the results" : "The setup was changed since",
+      text));
 }
 
 void ReportBuilder::addEvaluations() {
@@ -309,11 +315,14 @@ void ReportBuilder::addSeries() {
     note(fmt::format("The series of the initial evaluation are not shown: {} does not have them.", source.file));
   }
   const std::optional<ShownEvaluation>& best = data_.series.best;
-  if (best && best_ != nullptr && best->number != best_->number) {
-    note(
-        fmt::format("The series shown as best are those of evaluation {}: the file of the series has not been written "
-                    "since evaluation {}, which is better, was found.",
-                    best->number, best_->number));
+  if (!best || best_ == nullptr || best->number == best_->number) return;
+  const std::string shownAsBest = fmt::format("The series shown as best are those of evaluation {}", best->number);
+  if (rowOf(best->number) == nullptr) {
+    note(fmt::format("{}, which the result file does not hold; the best that it holds is evaluation {}.", shownAsBest,
+                     best_->number));
+  } else {
+    note(fmt::format("{}: the file of the series has not been written since evaluation {}, which is better, was found.",
+                     shownAsBest, best_->number));
   }
 }
 
@@ -330,6 +339,9 @@ void ReportBuilder::addAnalyses() {
   if (task.sensitivity != nullptr) {
     data_.sensitivity = reportedSensitivity(config_, *task.sensitivity, space(), sources_.results.rows, pairsOfRuns());
   }
+  std::string fault;
+  if (data_.sensitivity && hasAnalysis) fault = takeSensitivities(filePrefix_, *data_.sensitivity);
+  // The table that the run has written is of its own sets.
   if (data_.sensitivity && !data_.sensitivity->ofOtherSets.empty()) {
     note(
         fmt::format("Evaluations of other parameter sets than a sensitivity analysis of the setup, as it is now, would "
@@ -343,7 +355,6 @@ void ReportBuilder::addAnalyses() {
                      config_.plannedEvaluations()));
   }
   if (!data_.sensitivity || !hasAnalysis) return;
-  std::string fault = takeSensitivities(filePrefix_, *data_.sensitivity);
   if (!fault.empty()) {
     note(fmt::format("The derivatives, and the ranking by them, are computed again from the result file: {}.", fault));
   }

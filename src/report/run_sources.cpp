@@ -63,6 +63,10 @@ std::string ofAnotherTask(const std::string& path, const std::string& key, const
       path, other == all.end() ? std::string_view(key) : (*other)->facts().longName, wanted.facts().longName, setting);
 }
 
+std::string ofAnotherSetup(const std::string& path, const std::string& setup) {
+  return fmt::format("{}: it is of another setup, {}. Give one of the setups another name", path, setup);
+}
+
 void checkRowsOf(const std::string& checksumFile, const RunConfig& config, RunSources& sources) {
   std::error_code ignored;
   std::string reason;
@@ -91,14 +95,17 @@ std::optional<RunSources> readRunSources(const RunConfig& config, const SearchSp
   }
   RunSources sources;
   sources.setup = setupNamedIn(*text);
+  sources.isOfOtherSetup = !sources.setup.empty() && !isSameSetup(sources.setup, config.setupFile);
   sources.results = readResultTable(*text, resultColumns(config, space));
   if (sources.results.rows.empty() && sources.results.rowsOfOtherColumns == 0) {
-    reason = path + ": it holds no evaluation, so there is nothing to report";
+    reason = sources.isOfOtherSetup ? ofAnotherSetup(path, sources.setup)
+                                    : path + ": it holds no evaluation, so there is nothing to report";
     return std::nullopt;
   }
   auto record = readRecord(runFilePath(filePrefix, names->record), sources.recordFault);
   if (record && !record->task.empty() && record->task != config.task->facts().name.name) {
-    reason = ofAnotherTask(path, record->task, *config.task);
+    reason =
+        sources.isOfOtherSetup ? ofAnotherSetup(path, sources.setup) : ofAnotherTask(path, record->task, *config.task);
     return std::nullopt;
   }
   const bool isGoingOn = FileLock::isHeld(runFilePath(filePrefix, run_files::kRunLock));

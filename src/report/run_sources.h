@@ -18,8 +18,9 @@ namespace mirevo {
 
 /// What is known of a run from its files.
 struct RunSources {
-  std::string setup;    ///< the setup that the results name
-  ResultTable results;  ///< rows in the order of their numbers, each number once
+  std::string setup;            ///< the setup that the results name
+  bool isOfOtherSetup = false;  ///< that is another one than the setup of the report, by its name
+  ResultTable results;          ///< rows in the order of their numbers, each number once
   RunRecord record;
   std::string recordFault;  ///< why the record cannot be read; empty if it can, or if none was written
   RunStage stage = RunStage::running;

@@ -122,6 +122,8 @@ void RunDriver::openRun(const std::string& setupFileName) {
   std::error_code ignored;
   if (const std::string fault = faultOfFile(setup.folder); fault == std::strerror(ENOENT)) {
     fatalError("Error: Unable to open " + setup.file, fmt::format("there is no folder {}", setup.folder));
+  } else if (fault.empty()) {
+    fatalError("Error: Unable to open " + setup.file, fmt::format("{} is a file and no folder", setup.folder));
   }
   if (const std::string fault = faultOfFile(setup.file);
       !fault.empty() && std::filesystem::exists(setup.file, ignored)) {

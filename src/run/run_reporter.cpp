@@ -9,6 +9,7 @@
 #include "common/fatal_error.h"
 #include "common/progress_messages.h"
 #include "common/run_files.h"
+#include "common/text.h"
 
 namespace mirevo {
 namespace {
@@ -118,7 +119,7 @@ std::vector<std::string> RunReporter::differenceLines() const {
     }
     const std::size_t more = found.size() - shown;
     if (more == 0) continue;
-    lines.push_back(fmt::format("{}: {} more evaluation{}{}", texts.title, more, more == 1 ? "" : "s",
+    lines.push_back(fmt::format("{}: {}{}", texts.title, countText(more, "more evaluation"),
                                 pairs_ == nullptr ? "" : ", see " + fileNameOf(pairs_->path())));
   }
   return lines;

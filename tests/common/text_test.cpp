@@ -56,6 +56,10 @@ TEST(Text, SuggestsTheNearestNameAndNoFarOne) {
   EXPECT_EQ(nearestName("Ttle", names), "Title");
   EXPECT_EQ(nearestName("Weight", names), std::nullopt);
   EXPECT_EQ(nearestName("", names), std::nullopt);
+  const std::vector<std::string> letters = {"a", "b1"};
+  EXPECT_EQ(nearestName("c", letters), std::nullopt) << "one edit from any letter";
+  EXPECT_EQ(nearestName("A", letters), "a");
+  EXPECT_EQ(nearestName("b", letters), "b1");
   const std::vector<std::string> operators = {"<", "<=", ">", ">="};
   EXPECT_EQ(nearestName("=<", operators), "<=") << "as near as <, and as long";
   EXPECT_EQ(nearestName("=>", operators), ">=");

@@ -75,6 +75,8 @@ TEST(CommandLine, AMissingSetupFileIsNamedOnStandardErrorAndInTheLog) {
   folder.write("meant.kdx", "");
   folder.write("meant.log", "of the run");
   EXPECT_THAT(runProgram({(folder / "meant")}).error, HasSubstr("did you mean " + (folder / "meant.kdx") + "?"));
+  EXPECT_THAT(runProgram({(folder / "meant.kdx/")}).error, HasSubstr("Unable to open " + (folder / "meant.kdx/\n") +
+                                                                     (folder / "meant.kdx is a file and no folder")));
   EXPECT_EQ(folder.read("meant.log"), "of the run");
   EXPECT_FALSE(folder.exists("meant._spi_"));
 
@@ -138,11 +140,14 @@ TEST(Results, OfSetupsNamedAfterAResultOfAnotherAreNotLost) {
   folder.writeSetup({.option = 0});
   const std::string other = folder.read("basin.kdx");
   folder.writeSetup({.option = 0, .restart = 1});
+  std::string told;
   for (const char* name : {"basin", "basin_Run", "basin_Termination", "basin_Restart", "calSimErr", "basin_Run"}) {
     if (std::string_view(name) != "basin") folder.write(name + std::string(".kdx"), other);
     const ProgramResult run = runProgram({folder / name + ".kdx"});
     EXPECT_EQ(run.exitCode, 0) << name << run.error;
+    told = run.error;
   }
+  EXPECT_THAT(told, HasSubstr("Results of another setup, " + folder / "calSimErr.kdx"));
   EXPECT_THAT(folder.read("basin_Run.1.dat"), HasSubstr("plannedEvaluations"));  // the account, and the results twice
   EXPECT_THAT(folder.read("basin_Run.2.dat"), HasSubstr("\n1\tOK\t"));
   EXPECT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 1);  // its settings are those of basin_Restart.kdx no more

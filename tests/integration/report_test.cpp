@@ -120,12 +120,18 @@ TEST(Report, OfASensitivityAnalysisLeavesOutWhatIsOfOtherSetsThanThoseOfTheSetup
       "TqSEKdxListItemCount = 1\n      [CONSTRAINT_1]\n        Left_Equation = 'a'\n        Right_Equation = '4.01'\n"
       "        Logical_Operator = 1\n      [/CONSTRAINT_1]\n    [/INTERNAL_CONSTRAINTS]");
   EXPECT_EQ(makeReport(folder).exitCode, 0);
-  EXPECT_THAT(reportData(folder), HasSubstr(ofRun));
+  EXPECT_THAT(reportData(folder), AllOf(HasSubstr(ofRun), Not(HasSubstr("Evaluations of other parameter sets than"))));
   std::filesystem::remove(folder / "basin_Sensitivities.dat");  // those of an unfinished run come from its rows
   EXPECT_EQ(makeReport(folder).exitCode, 0);
   EXPECT_THAT(reportData(folder), AllOf(HasSubstr(R"("derivatives":[[-0.8194029,-0.8194029],[null,null]])"),
                                         HasSubstr("Evaluations of other parameter sets than"),
                                         HasSubstr(R"(the derivatives that need them: No. 3, 4.",)")));
+  std::string results = folder.read("basin_Sensitivity.dat");
+  const auto best = results.find("\n3\tOK\t");
+  folder.write("basin_Sensitivity.dat", results.erase(best, results.find("\n4\t") - best));
+  EXPECT_EQ(makeReport(folder).exitCode, 0);
+  EXPECT_THAT(reportData(folder),
+              HasSubstr("best are those of evaluation 3, which the result file does not hold; the "));
 }
 
 // Results without the files that this version adds: the report has all that the others hold.
@@ -229,6 +235,10 @@ TEST(Report, SaysWhatIsMissingInItsFilesAndIsNotMadeOfWhatIsNotThere) {
       makeReport(folder).error,
       HasSubstr("basin.dat: these are results of another task (uncertainty analysis), and the setup now selects "
                 "scenario runs. For their report, set Option = 3 again"));
+  const std::string results = folder.read("basin.dat");
+  folder.write("basin.dat", std::string(results).replace(results.find("basin.kdx"), 5, "other"));
+  EXPECT_THAT(makeReport(folder).error, HasSubstr("basin.dat: it is of another setup, " + folder / "other.kdx"));
+  folder.write("basin.dat", results);
   folder.editSetup("Option = 0", "Option = 3");
   cutTo("basin.dat", folder.read("basin.dat").find("\n1\tOK") + 1);
   const ProgramResult ofNone = makeReport(folder);

@@ -4,6 +4,8 @@
 
 #include <fmt/core.h>
 
+#include "common/text.h"
+
 namespace mirevo {
 
 ComparedObservations::ComparedObservations(std::span<const EvaluationResult> results) : results_(results) {
@@ -35,8 +37,8 @@ std::string ComparedObservations::differenceText(std::size_t one, std::size_t ot
                                                  const std::string& otherName) const {
   const std::size_t count = pairsOf(one, measure)->count;
   const std::size_t otherCount = pairsOf(other, measure)->count;
-  return fmt::format("evaluation {} has {} {} of simulated and observed values, {} {}", results_[one].number, count,
-                     count == 1 ? "pair" : "pairs", otherName,
+  return fmt::format("evaluation {} has {} of simulated and observed values, {} {}", results_[one].number,
+                     countText(count, "pair"), otherName,
                      count == otherCount ? "as many, of other observations" : std::to_string(otherCount));
 }
 

@@ -11,6 +11,7 @@
 #include "algorithms/numbers/lapack.h"
 #include "algorithms/numbers/sample_summary.h"
 #include "common/run_files.h"
+#include "common/text.h"
 
 namespace mirevo {
 
@@ -175,9 +176,11 @@ std::size_t factorise(std::vector<double>& gram, std::size_t k, std::span<const 
 
 /// Leaves out the parameters that cannot have a variance and returns the inverse of the Gram matrix of the others.
 std::vector<double> invertWhatCanBe(const WeightedModel& weighted, std::span<const double> lengths,
-                                    ParameterCovariance& result) {
+                                    std::span<const std::string> problems, ParameterCovariance& result) {
   for (std::size_t j = 0; j < lengths.size(); ++j) {
-    if (!std::isfinite(lengths[j])) {
+    if (j < problems.size() && !problems[j].empty()) {
+      result.leftOut.push_back({j, problems[j], true});
+    } else if (!std::isfinite(lengths[j])) {
       result.leftOut.push_back({j, "its derivatives are not known"});
     } else if (lengths[j] == 0.0) {
       result.leftOut.push_back({j, "no simulated value depends on it"});
@@ -236,7 +239,7 @@ ParameterCovariance parameterCovariance(const LinearisedModel& model) {
     const bool isKnown = std::all_of(column.begin(), column.end(), [](double value) { return std::isfinite(value); });
     lengths.push_back(isKnown ? normalise(column) : kNaN);
   }
-  const std::vector<double> inverse = invertWhatCanBe(weighted, lengths, result);
+  const std::vector<double> inverse = invertWhatCanBe(weighted, lengths, model.problems, result);
 
   const std::size_t k = result.kept.size();
   const std::size_t n = result.observationCount;
@@ -332,16 +335,13 @@ DataTable jacobianTable(const LinearisedModel& model, const SearchSpace& space,
 std::vector<std::string> formatCovariance(const ParameterCovariance& covariance, const SearchSpace& space,
                                           std::span<const double> set, std::string_view filePrefix) {
   std::vector<std::string> lines;
-  const auto counted = [](std::size_t count, const char* one, const char* more) {
-    return fmt::format("{} {}", count, count == 1 ? one : more);
-  };
-  lines.push_back(fmt::format("Parameter covariance: {}, {}, {}",
-                              counted(covariance.observationCount, "observation", "observations"),
-                              counted(covariance.kept.size(), "parameter", "parameters"),
-                              counted(covariance.degreesOfFreedom, "degree of freedom", "degrees of freedom")));
+  lines.push_back(fmt::format("Parameter covariance: {}, {}, {}", countText(covariance.observationCount, "observation"),
+                              countText(covariance.kept.size(), "parameter"),
+                              countText(covariance.degreesOfFreedom, "degree of freedom", "degrees of freedom")));
   for (const LeftOutParameter& parameter : covariance.leftOut) {
-    lines.push_back(fmt::format("Warning: Parameter {} is left out of the covariance matrix: {}",
-                                space.names[parameter.index], parameter.reason));
+    lines.push_back(fmt::format("{}Parameter {} is left out of the covariance matrix: {}",
+                                parameter.isKnownBefore ? "" : "Warning: ", space.names[parameter.index],
+                                parameter.reason));
   }
   if (covariance.kept.empty()) return lines;
   if (covariance.degreesOfFreedom == 0) {
@@ -350,7 +350,7 @@ std::vector<std::string> formatCovariance(const ParameterCovariance& covariance,
   }
   if (covariance.withoutDerivative > 0) {
     lines.push_back(fmt::format("Warning: {} left out of the covariance matrix: a perturbed run has no value there",
-                                counted(covariance.withoutDerivative, "observation is", "observations are")));
+                                countText(covariance.withoutDerivative, "observation is", "observations are")));
   }
   lines.push_back(fmt::format("Standard error of a residual: {:.6g}", std::sqrt(covariance.errorVariance)));
   for (std::string& line : lagOneLines(covariance.lagOne)) lines.push_back(std::move(line));

@@ -23,12 +23,15 @@ struct LinearisedModel {
   std::vector<double> widths = {};
   /// Which derivatives of each column are one-sided for want of a value, p of n; none when empty.
   std::vector<std::vector<bool>> oneSided = {};
+  /// Why a column is not known, p; an empty text for one that is. None when empty.
+  std::vector<std::string> problems = {};
 };
 
 /// A parameter without a variance, and why.
 struct LeftOutParameter {
   std::size_t index = 0;  ///< 0-based
   std::string reason;
+  bool isKnownBefore = false;  ///< it is that of a column that is not known, of which there is a warning already
 };
 
 /// The covariance matrix s^2 (J'WJ)^-1 of the parameters that have one, with s^2 = r'Wr / (n - k); search scale.

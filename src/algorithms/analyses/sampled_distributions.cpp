@@ -34,6 +34,14 @@ bool isMeanWithinBounds(const SearchSpace& space, std::size_t j, double mean) {
   return mean >= space.lower[j] && isWithinBounds(space, j, mean);
 }
 
+/// The share of the drawn values that the model gets within the bounds.
+double shareWithinBounds(const SearchSpace& space, std::size_t j, const NormalDistribution& distribution) {
+  const auto& [mean, deviation] = distribution;
+  const double lower = space.lower[j] - (isInteger(space, j) ? 1.0 : 0.0);  // truncated upwards
+  const double scale = deviation * std::sqrt(2.0);
+  return 0.5 * (std::erf((space.upper[j] - mean) / scale) - std::erf((lower - mean) / scale));
+}
+
 /// The model takes the step below a drawn value, so that a mean on a step has half of its values on the step below.
 std::string integerLine(const SearchSpace& space, std::size_t j, double mean) {
   const double step = toModelScale(space, j, mean);
@@ -78,15 +86,24 @@ std::vector<std::string> distributionLines(const UncertaintySettings& settings, 
 }
 
 std::vector<std::string> distributionWarnings(const UncertaintySettings& settings, const SearchSpace& space) {
+  constexpr double kHardlyMeant = 0.45;  // a mean on a bound leaves half
   std::vector<std::string> warnings;
   for (std::size_t j = 0; j < settings.parameters.size(); ++j) {
-    const double mean = settings.parameters[j].mean;
-    if (isMeanWithinBounds(space, j, mean)) continue;
+    const auto& [mean, deviation] = settings.parameters[j];
+    const std::string bounds =
+        fmt::format("bounds {:.6g} to {:.6g}", toModelScale(space, j, space.lower[j]), modelUpperBound(space, j));
+    if (isMeanWithinBounds(space, j, mean)) {
+      const double share = shareWithinBounds(space, j, settings.parameters[j]);
+      if (share > kHardlyMeant) continue;
+      warnings.push_back(fmt::format(
+          "Standard_Deviation of PARAMETER_{} ({}) is {}: about {:.0f} % of the values drawn are outside the {}", j + 1,
+          space.names[j], formatReal(deviation), 100.0 * (1.0 - share), bounds));
+      continue;
+    }
     const std::string onModelScale =
         isInteger(space, j) ? "" : fmt::format(", on the model scale {:.6g}", toModelScale(space, j, mean));
-    std::string text = fmt::format("Mean_Value of PARAMETER_{} ({}) is {}{}: outside the bounds {:.6g} to {:.6g}",
-                                   j + 1, space.names[j], formatReal(mean), onModelScale,
-                                   toModelScale(space, j, space.lower[j]), modelUpperBound(space, j));
+    std::string text = fmt::format("Mean_Value of PARAMETER_{} ({}) is {}{}: outside the {}", j + 1, space.names[j],
+                                   formatReal(mean), onModelScale, bounds);
     const bool isLogarithm = space.transformation[j] == TransformationType::logarithmic;
     if (isLogarithm && mean > 0.0 && isWithinBounds(space, j, std::log(mean))) {
       text += fmt::format("; the mean of a logarithmic parameter is that of its natural logarithm, ln({}) = {:.6g}",

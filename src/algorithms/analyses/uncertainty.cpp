@@ -136,8 +136,9 @@ std::vector<ParameterSet> drawSample(const UncertaintySettings& settings, Unifor
       complete == 0 ? feasibility.noSetMessage() : "Error: Too few parameter sets found that can be run",
       fmt::format("{} of the {} sets wanted, of {} drawn, an acceptance rate of {:.2g} %; the last one: {}\nMake "
                   "means, standard deviations and constraints (or equations) agree, so that more of the sets "
-                  "drawn can be run, or take a smaller Sample_Size",
-                  complete, sample.sets.size(), sample.drawnCount, rate, violation));
+                  "drawn can be run{}",
+                  complete, sample.sets.size(), sample.drawnCount, rate, violation,
+                  complete == 0 ? "" : ", or take a smaller Sample_Size"));
 }
 
 }  // namespace

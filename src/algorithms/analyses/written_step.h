@@ -2,7 +2,7 @@
 
 #include <span>
 
-#include "algorithms/analyses/local_sensitivity.h"
+#include "algorithms/analyses/perturbation_plan.h"
 #include "parameters/parameter_fields.h"
 
 namespace mirevo {

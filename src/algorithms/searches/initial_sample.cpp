@@ -95,8 +95,10 @@ std::vector<std::size_t> parametersOfColumns(const std::vector<std::string_view>
     const auto found = std::find(space.names.begin(), space.names.end(), name);
     if (found == space.names.end()) {
       const std::optional<std::string> near = nearestName(name, space.names);
-      fatalError(kInvalidFile, fmt::format("{}: \"{}\" is not the name of a variable parameter{}", place, name,
-                                           near ? fmt::format("; did you mean \"{}\"?", *near) : ""));
+      const std::string hint = near              ? fmt::format("; did you mean \"{}\"?", *near)
+                               : parseReal(name) ? "; the names are expected in a row above the values"
+                                                 : "";
+      fatalError(kInvalidFile, fmt::format("{}: \"{}\" is not the name of a variable parameter{}", place, name, hint));
     }
     const auto parameter = static_cast<std::size_t>(found - space.names.begin());
     if (std::find(parameters.begin(), parameters.end(), parameter) != parameters.end()) {

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <numbers>
 #include <optional>
+#include <utility>
 
 #include <fmt/core.h>
 
@@ -231,11 +232,17 @@ class Translator final {
   void takeOperator() {
     static constexpr std::string_view kOperators[] = {"<=", ">=", "!=", "==", "&&", "||", "**",
                                                       "<",  ">",  "+",  "-",  "*",  "/",  "^"};
+    static constexpr std::pair<std::string_view, std::string_view> kMisspelt[] = {
+        {"<>", "!="}, {"><", "!="}, {"=<", "<="}, {"=>", ">="}};
     const char c = here();
     if (c == ')') return closeBracket();
     if (c == ',') return takeComma();
     if (c == '?') return takeQuestion();
     if (c == ':') return takeColon();
+    for (const auto& [found, meant] : kMisspelt) {
+      if (!startsWith(found)) continue;
+      fail(at_, fmt::format("\"{}\" is no operator of an equation", found), fmt::format("did you mean {}?", meant));
+    }
     for (const std::string_view symbol : kOperators) {
       if (!startsWith(symbol)) continue;
       emit(symbol == "**" ? "^" : symbol);

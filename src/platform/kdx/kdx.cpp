@@ -110,7 +110,10 @@ class KdxParser final {
     keyword.position = cursor_.position();
     keyword.name = cursor_.takeWhile(isNameCharacter);
     if (keyword.name.empty()) {
-      return fail(keyword.position, fmt::format("expected a section or a keyword, found {}", cursor_.describeNext()));
+      const std::string found = cursor_.describeNext();
+      const bool maybeComment = found.starts_with("\"#") || found.starts_with("\";") || found.starts_with("\"!");
+      return fail(keyword.position, fmt::format("expected a section or a keyword, found {}{}", found,
+                                                maybeComment ? "; a comment begins with //" : ""));
     }
     if (open_.size() == 1) {
       return fail(keyword.position,

@@ -44,12 +44,12 @@ std::string whyNoRoom(const std::string& source, const std::string& where, int r
   const auto shares = static_cast<std::uintmax_t>(runs);
   const FolderExtent left{shares * copy.bytes + kForResults.bytes, shares * copy.entries + kForResults.entries};
   if (const std::uintmax_t free = std::uintmax_t{disk.f_bavail} * disk.f_frsize; copy.bytes + left.bytes > free) {
-    return fmt::format("it needs {} of the {} that are free on its disk, and {} are left to the run",
-                       megabytes(copy.bytes), megabytes(free), megabytes(left.bytes));
+    return fmt::format("it needs {}, and {} must remain for the run, but its disk has only {} free",
+                       megabytes(copy.bytes), megabytes(left.bytes), megabytes(free));
   }
   if (disk.f_files > 0 && copy.entries + left.entries > disk.f_favail) {  // 0: the file system has no such limit
-    return fmt::format("it needs {} of the {} files that its disk has room for, and {} are left to the run",
-                       copy.entries, disk.f_favail, left.entries);
+    return fmt::format("it is {} files, and {} more must remain for the run, but its disk has room for only {}",
+                       copy.entries, left.entries, disk.f_favail);
   }
   return {};
 }

@@ -362,8 +362,9 @@ std::size_t SetupSection::readCount(std::string_view itemPrefix) const {
   echo(row, SetupValue(count), false);
   if (count < 0) refuseToRead(keyword->position, row.name(), fmt::format("expected 0 or more, found {}", count));
   if (present > static_cast<std::size_t>(count)) {
-    warn(row.name(), fmt::format("{} sections {}n are here, those beyond {} are not read: {}", present, itemPrefix,
-                                 count, namesBeyond(*node_, itemPrefix, count)));
+    const std::string_view verb = present == 1 ? "is" : "are";
+    warn(row.name(), fmt::format("{} {}n {} here, those beyond {} are not read: {}", countText(present, "section"),
+                                 itemPrefix, verb, count, namesBeyond(*node_, itemPrefix, count)));
   }
   return static_cast<std::size_t>(count);
 }

@@ -139,6 +139,7 @@ class SetupSection final {
   const std::string& path() const { return path_; }
   /// The keyword's text as written in the setup, without trailing blanks; empty if it is absent.
   std::string written(std::string_view keyword) const;
+  bool isWritten(std::string_view keyword) const { return node_->keyword(keyword) != nullptr; }
 
  private:
   template <class Settings, class Item, class ReadItem, class SettingsOf>

@@ -158,6 +158,8 @@ std::string nearestCode(std::span<const CodeName> codes, std::string_view writte
   const bool isOperator = std::find(names.begin(), names.end(), "<=") != names.end();
   if (isOperator && (written == "==" || written == "="))
     return "; what must be equal needs two constraints, '<=' and '>='";
+  if (isOperator && (written == "<>" || written == "><" || written == "!="))
+    return "; what must differ needs the equation abs(left - right) and '>' 0";
   const auto nearest = nearestName(written, names);
   return nearest ? fmt::format(", did you mean '{}'?", *nearest) : "";
 }
@@ -165,8 +167,10 @@ std::string nearestCode(std::span<const CodeName> codes, std::string_view writte
 Converted convertSetupValue(const KeywordRow& row, const KdxKeyword& keyword) {
   if (row.type == KeywordType::realList) return convertList(keyword);
   if (keyword.values.size() != 1) {
+    const bool maybeDecimal = keyword.values.size() == 2 && row.type == KeywordType::real;
     return SetupValueError{keyword.values.size() > 1 ? keyword.values[1].position : keyword.position,
-                           fmt::format("expected one value, found {}", keyword.values.size())};
+                           fmt::format("expected one value, found {}{}", keyword.values.size(),
+                                       maybeDecimal ? ": numbers have a decimal point, a comma separates values" : "")};
   }
   return convertOne(row, keyword.values.front());
 }

@@ -14,6 +14,7 @@
 #include "run/results/restart_settings.h"
 #include "run/results/row_check.h"
 #include "run/results/row_checksums.h"
+#include "run/results/shared_files.h"
 
 namespace mirevo {
 namespace {
@@ -105,19 +106,10 @@ void dropFailuresAtEnd(EarlierRun& run) {
   run.notes.push_back(fmt::format("Restart = 2: {} failed evaluations at the end are made again", count));
 }
 
-}  // namespace
-
-RestartFiles restartFiles(const std::string& filePrefix, const ResultFileNames& names) {
-  return {runFilePath(filePrefix, names.results),         runFilePath(filePrefix, names.restart),
-          runFilePath(filePrefix, names.simulatedValues), runFilePath(filePrefix, names.record),
-          runFilePath(filePrefix, names.failures),        runFilePath(filePrefix, names.pairs),
-          runFilePath(filePrefix, names.checksums)};
-}
-
-std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunConfig& config,
-                                         const ResultColumns& columns, std::optional<RunRecord> record) {
-  const auto text = readFileIfThere(files.results);
-  ResultTable table = readResultTable(text.value_or(""), columns);
+/// findEarlierRun() of a result file with this text.
+std::optional<EarlierRun> earlierRunIn(const std::string& text, const RestartFiles& files, const RunConfig& config,
+                                       const ResultColumns& columns, std::optional<RunRecord> record) {
+  ResultTable table = readResultTable(text, columns);
   // Not just a cut-off beginning: there may be days of work below a damaged header row.
   if (!table.hasHeader && table.unusableLines > 1) {
     refuse(files.results + " has no header row that can be read", files.results, run_files::kPlain.results);
@@ -147,6 +139,31 @@ std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunCon
   const auto earlierBudget = searchBudget(then);
   if (earlierBudget && config.task) raiseBudget(*config.task, *earlierBudget, run);
   return run;
+}
+
+}  // namespace
+
+RestartFiles restartFiles(const std::string& filePrefix, const ResultFileNames& names) {
+  return {runFilePath(filePrefix, names.results),         runFilePath(filePrefix, names.restart),
+          runFilePath(filePrefix, names.simulatedValues), runFilePath(filePrefix, names.record),
+          runFilePath(filePrefix, names.failures),        runFilePath(filePrefix, names.pairs),
+          runFilePath(filePrefix, names.checksums)};
+}
+
+std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunConfig& config,
+                                         const ResultColumns& columns, std::optional<RunRecord> record) {
+  const std::string text = readFileIfThere(files.results).value_or("");
+  const std::string setup = setupNamedIn(text);
+  if (setup.empty() || isSameSetup(setup, config.setupFile))
+    return earlierRunIn(text, files, config, columns, std::move(record));
+  try {
+    return earlierRunIn(text, files, config, columns, std::move(record));  // the setup may have been renamed
+  } catch (const FatalError& error) {
+    fatalError(error.message(),
+               fmt::format("{} names another setup, {}. If it is not this one under its earlier name, give one of the "
+                           "two another name.\n{}",
+                           files.results, setup, error.detail()));
+  }
 }
 
 std::map<int, EarlierEvaluations::Record> earlierRecords(EarlierRun& run,

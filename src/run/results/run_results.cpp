@@ -172,8 +172,8 @@ std::vector<std::string> RunResults::earlierBands(RunLog& log) const {
 }
 
 void RunResults::keepEarlierFiles(const RunConfig& config, RunLog& log) const {
-  keepEarlierFile(failedRuns_.paths().forPeople, log);
-  std::vector<std::string> paths{files_.results, files_.settings, files_.simulatedValues};
+  std::vector<std::string> paths{failedRuns_.paths().forPeople, files_.results, files_.settings,
+                                 files_.simulatedValues};
   for (std::string& path : pathsBesideResults()) paths.push_back(std::move(path));
   keepEarlierResults(paths, config.setupFile, log);
   if (names_.results == run_files::kPlain.results) {
@@ -230,7 +230,9 @@ void RunResults::restorePairs(const RunConfig& config, std::span<const ResultRow
 
 void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggregator, RunLog& log) {
   EarlierRun run = *std::exchange(earlierRun_, std::nullopt);
-  keepResultsOfAnother(files_.results, pathsBesideResults(), config.setupFile, log);
+  std::vector<std::string> beside = pathsBesideResults();
+  beside.push_back(failedRuns_.paths().forPeople);
+  keepResultsOfAnother(files_.results, beside, config.setupFile, log);
   if (earlierRunHasStatistics_) removeStatistics(config);
   std::map<int, std::vector<double>> failedSets;
   std::set<int> failed;

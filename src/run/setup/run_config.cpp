@@ -35,7 +35,7 @@ std::size_t RunConfig::variableParameterCount() const {
 }
 
 int RunConfig::plannedEvaluations() const {
-  return task ? task->plannedEvaluations(variableParameterCount()) : 0;
+  return task ? task->plannedEvaluations() : 0;
 }
 
 int RunConfig::plannedModelRuns() const {

@@ -13,6 +13,7 @@
 #include "common/text.h"
 #include "measures/statistics.h"
 #include "parameters/search_space.h"
+#include "run/tasks/off_grid.h"
 
 namespace mirevo {
 namespace {
@@ -55,10 +56,8 @@ void warnOfIdValues(const RunConfig& config, const SectionsRead& sections) {
 }
 
 void warnOffGrid(const ModelParameter& parameter, double value, std::string_view keyword, const SetupSection& section) {
-  if (isOnGrid(parameter, value)) return;
-  section.warn(keyword,
-               fmt::format("{} is not a whole number of steps above Lower_Bound = {}, {} is taken", formatReal(value),
-                           formatReal(parameter.lowerBound), formatReal(onGrid(parameter, value))));
+  const std::string text = offGridText(parameter, value);
+  if (!text.empty()) section.warn(keyword, fmt::format("{} {}", formatReal(value), text));
 }
 
 void warnOfParameters(const RunConfig& config, const SectionsRead& sections) {

@@ -66,7 +66,8 @@ class SetupReader final {
     readObjectiveFunctions();
     readSavedFiles();
     if (config_.task) {
-      config_.task->read({target_, config_.parameters, sections_.parameters, config_.variableParameterCount(),
+      config_.task->read({target_, config_.parameters, sections_.parameters, config_.constraints,
+                          config_.variableParameterCount(),
                           [this](bool hasInitialSample) { requireScales(hasInitialSample); }});
       for (std::size_t i = 0; i < config_.parameters.size(); ++i) {
         config_.parameters[i].givenValues = config_.task->givenValues(i);

@@ -13,6 +13,7 @@
 #include "common/text.h"
 #include "run/access/file_validation.h"
 #include "run/tasks/infeasible_sets.h"
+#include "run/tasks/off_grid.h"
 
 namespace mirevo {
 namespace {
@@ -104,12 +105,11 @@ void warnOffGrid(const ModelParameter& parameter, std::span<const double> values
   const auto isOff = [&parameter](double value) { return !isOnGrid(parameter, value); };
   const auto first = std::find_if(values.begin(), values.end(), isOff);
   if (first == values.end()) return;
-  section.warn(
-      kInitialSampleFileKeyword,
-      fmt::format("{} of the {} values of the integer parameter {} are not whole numbers of steps above "
-                  "Lower_Bound = {}; of the first, {}, {} is taken",
-                  std::count_if(first, values.end(), isOff), values.size(), quotedForMessage(parameter.name),
-                  formatReal(parameter.lowerBound), formatReal(*first), formatReal(onGrid(parameter, *first))));
+  const auto count = std::count_if(first, values.end(), isOff);
+  section.warn(kInitialSampleFileKeyword,
+               fmt::format("{} of the {} values of the integer parameter {} {} between its steps: {} {}", count,
+                           values.size(), quotedForMessage(parameter.name), count == 1 ? "is" : "are",
+                           formatReal(*first), offGridText(parameter, *first)));
 }
 
 }  // namespace
@@ -149,6 +149,7 @@ void OptimisationTask::read(const TaskReading& reading) {
   const SetupSection sample = section.open(nameInside(initialSampleSection().row));
   InitialSampleSection filled{initialSample, randomSeed};
   sample.read(initialSampleSection(), filled);
+  warnOfUnusedSample(sample);
   if (initialSample.generation == SampleGeneration::fromFile) {
     validateFileOpens(initialSample.fileName, kInitialSampleFileKeyword, sample);
     if (method->facts().drawsInitialSample) takeGivenValues(reading, sample);
@@ -161,6 +162,17 @@ void OptimisationTask::read(const TaskReading& reading) {
   const SetupSection stops = section.open(nameInside(stoppingSection().row));
   readStopping(stops, reading.variableCount);
   if (surrogateUse == SurrogateUse::yes) readSurrogate(reading, section, stops);
+}
+
+/// A setup that names no way of drawing means none in particular.
+void OptimisationTask::warnOfUnusedSample(const SetupSection& section) const {
+  constexpr std::string_view kKeyword = "Initial_Sample_Generation";
+  const bool isWanted = initialSample.generation != SampleGeneration::uniformRandom && section.isWritten(kKeyword);
+  if (method->facts().drawsInitialSample || !isWanted) return;
+  section.warn(kKeyword, fmt::format("{} has no effect: {} {}", static_cast<int>(initialSample.generation),
+                                     method->facts().longName,
+                                     method->evaluatesSample(initialSample) ? "draws its start points uniformly"
+                                                                            : "starts from the initial values alone"));
 }
 
 /// The values of the sample file, which runs get exactly.

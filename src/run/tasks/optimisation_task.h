@@ -22,7 +22,7 @@ class OptimisationTask final : public Task {
   std::vector<double> givenValues(std::size_t parameter) const override;
   std::string description() const override;
   std::vector<std::string> summaryLines(const SearchSpace& space) const override;
-  int plannedEvaluations(std::size_t /*variableCount*/) const override { return stopping.maxEvaluations; }
+  int plannedEvaluations() const override { return stopping.maxEvaluations; }
   bool hasFinalRun() const override { return true; }
   bool drawsRandomNumbers() const override { return true; }
   std::optional<OneSlotOnly> needsOneSlot() const override;
@@ -42,6 +42,7 @@ class OptimisationTask final : public Task {
  private:
   /// Whether a surrogate model assists the search.
   bool usesSurrogate() const { return surrogateUse == SurrogateUse::yes && method->facts().usesSurrogate; }
+  void warnOfUnusedSample(const SetupSection& section) const;
   void takeGivenValues(const TaskReading& reading, const SetupSection& section);
   void readMethod(const TaskReading& reading, const SetupSection& section) const;
   void readStopping(const SetupSection& section, std::size_t variableCount);

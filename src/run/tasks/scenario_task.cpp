@@ -5,6 +5,7 @@
 #include "common/fatal_error.h"
 #include "common/text.h"
 #include "run/tasks/infeasible_sets.h"
+#include "run/tasks/off_grid.h"
 
 namespace mirevo {
 namespace {
@@ -72,19 +73,18 @@ void warnOfUnusedValues(std::span<const double> values, std::span<const ModelPar
   for (std::size_t i = 0; i < values.size(); ++i) {
     const ModelParameter& parameter = parameters[i];
     if (told[i]) continue;
-    if (parameter.parameterType == ParameterType::variable && !isOnGrid(parameter, values[i])) {
-      told[i] = true;
-      section.warn(kValuesKeyword,
-                   fmt::format("value {}, {}, of the integer parameter {} is not a whole number of steps "
-                               "above Lower_Bound = {}, {} is taken; so for all such values",
-                               i + 1, formatReal(values[i]), quotedForMessage(parameter.name),
-                               formatReal(parameter.lowerBound), formatReal(onGrid(parameter, values[i]))));
+    const std::string name = quotedForMessage(parameter.name);
+    std::string text;
+    if (parameter.parameterType == ParameterType::variable) {
+      if (const std::string offGrid = offGridText(parameter, values[i]); !offGrid.empty()) {
+        text = fmt::format("of the integer parameter {} {}; so for all such values", name, offGrid);
+      }
+    } else if (parameter.parameterType == ParameterType::fixed && values[i] != parameter.initialValue) {
+      text = fmt::format("is not used: parameter {} is fixed at {}", name, formatReal(parameter.initialValue));
     }
-    if (parameter.parameterType != ParameterType::fixed || values[i] == parameter.initialValue) continue;
+    if (text.empty()) continue;
     told[i] = true;
-    section.warn(kValuesKeyword,
-                 fmt::format("value {}, {}, is not used: parameter {} is fixed at {}", i + 1, formatReal(values[i]),
-                             quotedForMessage(parameter.name), formatReal(parameter.initialValue)));
+    section.warn(kValuesKeyword, fmt::format("value {}, {}, {}", i + 1, formatReal(values[i]), text));
   }
 }
 
@@ -135,7 +135,7 @@ std::string ScenarioTask::description() const {
                                                   : "Scenario runs: Multiple runs";
 }
 
-int ScenarioTask::plannedEvaluations(std::size_t /*variableCount*/) const {
+int ScenarioTask::plannedEvaluations() const {
   return settings.type == ScenarioType::singleRun ? 1 : static_cast<int>(settings.runs.size());
 }
 

@@ -25,7 +25,7 @@ class ScenarioTask final : public Task {
   void read(const TaskReading& reading) override;
   std::vector<double> givenValues(std::size_t parameter) const override;
   std::string description() const override;
-  int plannedEvaluations(std::size_t variableCount) const override;
+  int plannedEvaluations() const override;
   TaskOutcome run(const TaskContext& context) override;
 
   ScenarioSettings settings;

@@ -12,6 +12,7 @@
 #include "common/calendar.h"
 #include "evaluation/stored_results.h"
 #include "measures/period_series.h"
+#include "parameters/parameter_model.h"
 #include "run/tasks/analysis_names.h"
 #include "run/tasks/infeasible_sets.h"
 
@@ -176,16 +177,16 @@ void SensitivityTask::read(const TaskReading& reading) {
   const SetupSection local = section.open("LOCAL_SA");
   local.read(localSensitivitySection(), settings);
   validateLocalSensitivity(settings, reading.parameters, local);
+  ParameterModel model({reading.parameters.begin(), reading.parameters.end()},
+                       {reading.constraints.begin(), reading.constraints.end()});
+  const SearchSpace& space = model.searchSpace();
+  const auto plan = planPerturbations(settings, space, space.initial, {}, model.feasibility());
+  planned_ = static_cast<int>(plan.sets.size());
 }
 
 std::string SensitivityTask::description() const {
   return fmt::format("Sensitivity analysis: Local sensitivity analysis, {} differences",
                      kDifferencingNames[settings.differencing == Differencing::central ? 1 : 0].name);
-}
-
-int SensitivityTask::plannedEvaluations(std::size_t variableCount) const {
-  const int perParameter = settings.differencing == Differencing::central ? 2 : 1;
-  return 1 + perParameter * static_cast<int>(variableCount);
 }
 
 TaskOutcome SensitivityTask::outcomeOf(const TaskContext& context, Evaluator& evaluator) const {
@@ -206,7 +207,7 @@ TaskOutcome SensitivityTask::outcomeOf(const TaskContext& context, Evaluator& ev
 TaskOutcome SensitivityTask::run(const TaskContext& context) {
   const PerturbationPlan plan =
       planPerturbations(settings, context.space, context.space.initial, {}, context.feasibility);
-  warnOfInfeasibleSets(context, plan.sets, "sets of the analysis", plannedEvaluations(context.space.size()));
+  warnOfInfeasibleSets(context, plan.sets, "sets of the analysis", static_cast<int>(plan.sets.size()));
   TaskOutcome outcome = outcomeOf(context, context.evaluator);
   logReport(context, outcome.report);
   return outcome;
@@ -227,7 +228,7 @@ std::optional<TaskOutcome> SensitivityTask::unfinishedOutcome(const TaskContext&
   EvaluationResult missing;
   missing.measureValues.assign(context.measures.size(), kFailedRunValue);
   missing.objectiveValues.assign(context.objectives.size(), kFailedRunValue);
-  missing.failure = {EvaluationFailure::Kind::notKnown, "the run ended before it was made", {}};
+  missing.failure = {EvaluationFailure::Kind::notMade, "the run ended before", {}};
   StoredResults evaluator(context.space, std::move(records), std::move(missing));
   return outcomeOf(context, evaluator);
 }

@@ -15,7 +15,7 @@ class SensitivityTask final : public Task {
   std::vector<std::string> neededSections(const SetupSection& target) const override;
   void read(const TaskReading& reading) override;
   std::string description() const override;
-  int plannedEvaluations(std::size_t variableCount) const override;
+  int plannedEvaluations() const override { return planned_; }
   bool keepsSimulatedValues() const override { return settings.calculatesCovariance; }
   SeriesPrecision keptPrecision() const override { return SeriesPrecision::exact; }
   bool usesExactMeasures() const override { return true; }
@@ -29,6 +29,8 @@ class SensitivityTask final : public Task {
  private:
   /// The analysis by the evaluations that `evaluator` makes, without the log.
   TaskOutcome outcomeOf(const TaskContext& context, Evaluator& evaluator) const;
+
+  int planned_ = 0;  ///< the sets of the setup's plan
 };
 
 }  // namespace mirevo

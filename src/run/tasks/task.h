@@ -40,6 +40,7 @@ struct TaskReading {
   const SetupSection& target;
   std::span<const ModelParameter> parameters;
   std::span<const SetupSection> parameterSections;  ///< one per parameter
+  std::span<const InternalConstraint> constraints;
   std::size_t variableCount = 0;
   /// Refuses an aggregation method whose scales are neither given in the setup nor determined from an initial sample.
   std::function<void(bool hasInitialSample)> requireScales;
@@ -127,8 +128,8 @@ class Task {
   /// Warnings for the log about settings that work but may not be meant.
   virtual std::vector<std::string> warnings(const SearchSpace& /*space*/) const { return {}; }
 
-  /// Number of planned evaluations, on which the failed-run limit is based.
-  virtual int plannedEvaluations(std::size_t variableCount) const = 0;
+  /// Number of planned evaluations, once its sections are read, on which the failed-run limit is based.
+  virtual int plannedEvaluations() const = 0;
   /// Whether a final model run repeats the best parameter set.
   virtual bool hasFinalRun() const { return false; }
   /// Whether the results depend on the random seed.

@@ -15,7 +15,7 @@ class UncertaintyTask final : public Task {
   std::string description() const override;
   std::vector<std::string> summaryLines(const SearchSpace& space) const override;
   std::vector<std::string> warnings(const SearchSpace& space) const override;
-  int plannedEvaluations(std::size_t /*variableCount*/) const override { return settings.sampleSize; }
+  int plannedEvaluations() const override { return settings.sampleSize; }
   bool drawsRandomNumbers() const override { return true; }
   bool keepsSimulatedValues() const override { return true; }
   void requireSets(const SearchSpace& space, const Feasibility& feasibility) const override;

@@ -205,13 +205,15 @@ EvaluationResult evaluate(const ParameterSet& p) {
 }
 
 /// An evaluator of this problem by which the sets that `fails` names fail.
-FunctionEvaluator failingWhere(bool (*fails)(const ParameterSet&)) {
-  return FunctionEvaluator([fails](const ParameterSet& p) {
+FunctionEvaluator failingWhere(bool (*fails)(const ParameterSet&),
+                               const EvaluationFailure& failure = {
+                                   EvaluationFailure::Kind::timedOut, "the batch ran out of time", {}}) {
+  return FunctionEvaluator([fails, failure](const ParameterSet& p) {
     EvaluationResult result = evaluate(p);
     if (!fails(p)) return result;
     result.measureValues = {kFailedRunValue, kFailedRunValue};
     result.objectiveValues = result.measureValues;
-    result.failure = EvaluationFailure{EvaluationFailure::Kind::timedOut, "the batch ran out of time", {}};
+    result.failure = failure;
     return result;
   });
 }
@@ -250,6 +252,10 @@ TEST(LocalSensitivity, LeavesAFailedRunsColumnOutByNameOrUsesTheOtherSide) {
       formatSensitivity(forward, kNamesOfThree),
       AllOf(Contains("Warning: Parameter p2 has no derivatives: evaluation 3 failed: the batch ran out of time"),
             Contains("     3. p2                          NaN")));
+  FunctionEvaluator ended = failingWhere([](const ParameterSet& p) { return p[1] != 1.0; },
+                                         {EvaluationFailure::Kind::notMade, "the run ended before", {}});
+  EXPECT_EQ(localSensitivity({kForward, kOfRange, 0.1}, kThreeParameters, ended).plan.differences[1].problem,
+            "evaluation 3 was not made: the run ended before");
 
   FunctionEvaluator failingAbove = failingWhere([](const ParameterSet& p) { return p[0] > 2.0; });
   const LocalSensitivity central = localSensitivity({kCentral, kOfRange, 0.1}, kThreeParameters, failingAbove);

@@ -69,10 +69,11 @@ TEST(UncertaintySample, DrawsOnlySetsThatCannotBeRunAgain) {
     }
     EXPECT_NEAR(static_cast<double>(sample.drawnCount), 400, 80) << "half of the sets can be run";
     EXPECT_EQ(feasibleUncertaintySample(settings, 5, {}).sets, drawn);
-    EXPECT_THAT(refusalOf([&] { feasibleUncertaintySample(settings, 5, above(40.0)); }),
-                StartsWith("Error: No parameter set found that satisfies the constraints\n"
-                           "0 of the 200 sets wanted, of 1200200 drawn, an acceptance rate of 0 %; the last one: too "
-                           "small\nMake means, standard deviations and constraints (or equations) agree, "));
+    EXPECT_EQ(refusalOf([&] { feasibleUncertaintySample(settings, 5, above(40.0)); }),
+              "Error: No parameter set found that satisfies the constraints\n"
+              "0 of the 200 sets wanted, of 1200200 drawn, an acceptance rate of 0 %; the last one: too small\n"
+              "Make means, standard deviations and constraints (or equations) agree, so that more of the sets drawn "
+              "can be run");
     EXPECT_THAT(refusalOf([&] { feasibleUncertaintySample(settings, 5, above(3.9)); }),
                 StartsWith("Error: Too few parameter sets found that can be run\n"));
   }
@@ -126,7 +127,7 @@ TEST(UncertaintySummary, IsOfTheValuesThatTheModelGets) {
   EXPECT_EQ(setsOutsideBounds(sample, space), "Sets outside the bounds of a parameter: 3 of 4 (a in 3, b in 1)");
 }
 
-TEST(DistributionWarnings, AreOfMeansOutsideTheBounds) {
+TEST(DistributionWarnings, AreOfMeansOutsideTheBoundsAndOfMostValuesThere) {
   const SearchSpace space{.names = {"a", "n"},
                           .lower = {std::log(0.5), 0.0},
                           .upper = {std::log(4.0), 7.0},  // n is at most 6
@@ -141,6 +142,10 @@ TEST(DistributionWarnings, AreOfMeansOutsideTheBounds) {
     const std::vector<std::string> found = distributionWarnings(settings, space);
     EXPECT_EQ(found, warning == nullptr ? std::vector<std::string>{} : std::vector<std::string>{warning}) << mean;
   }
+  // Values from -1 to 7 become 0 to 6: the normal distribution has 0.3829 within half a standard deviation.
+  EXPECT_THAT(distributionWarnings({SamplingType::simpleRandom, 5, {{0.0, 1.0}, {3.0, 8.0}}}, space),
+              ElementsAre("Standard_Deviation of PARAMETER_2 (n) is 8: about 62 % of the values drawn are outside the "
+                          "bounds 0 to 6"));
   const UncertaintySettings settings{SamplingType::simpleRandom, 5, {{3.0, 1.0}, {2.0, 0.6}}};
   EXPECT_THAT(
       distributionWarnings(settings, space),

@@ -102,6 +102,7 @@ TEST(InitialSample, NamesTheLineOfWhatIsWrongInAFile) {
       {"", "s.txt: expected a header of parameter names and one set a row, found nothing"},
       {"\xFF\xFEk", "s.txt: the file is UTF-16 text; save it as UTF-8"},
       {"k layers n\n", "found a header alone"},
+      {"1 2 3\n", "s.txt:1: \"1\" is not the name of a variable parameter; the names are expected in a row above"},
       {"k layer n\n", "s.txt:1: \"layer\" is not the name of a variable parameter; did you mean \"layers\"?"},
       {"#\nk layers\n1 1\n", "s.txt:2: no column for parameter \"n\""},
       {"k layers n k\n", "s.txt:1: parameter \"k\" has a second column"},

@@ -98,6 +98,8 @@ TEST_F(ExpressionEvaluatorTest, SaysWhatIsWrongAndWhere) {
       {"1 +", "column 4: the equation ends where"},
       {"höhe höhe", "column 6: an operator is expected"},
       {"a = 5", "column 3: \"=\" is no operator of an equation\n    a = 5\n      ^\nwrite == to compare two values"},
+      {"a <> 5", "column 3: \"<>\" is no operator of an equation\n    a <> 5\n      ^\ndid you mean !=?"},
+      {"a => 5", "did you mean >=?"},
       {"(a", "column 1: \"(\" has no \")\""},
       {"a)", "column 2: \")\" without"},
       {"()", "column 2: a number, a name"},

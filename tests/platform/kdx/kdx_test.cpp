@@ -41,6 +41,7 @@ TEST(Kdx, NamesTheFirstPlaceThatIsWrongAndWhatWasExpected) {
       {"[A]\nx = 'open\n'", "2:5: expected a closing ' before the end of the line"},
       {"[A]\nx = \"it's\n", "2:5: expected a closing \" before the end of the line"},
       {std::string("[A]\nx = 'a\0b'\n", 13), "2:7: expected a text without control characters, found character 0"},
+      {"[A]\n# note\n", "2:1: expected a section or a keyword, found \"# note\"; a comment begins with //"},
       {"[A]\n= 3\n", "2:1: expected a section or a keyword, found \"= 3\""},
       {"x = 3\n", "1:1: expected a section before keyword \"x\""},
       {"[]\n", "1:2: expected the name of a section, found \"]\""},

@@ -123,7 +123,7 @@ TEST(ProcessFolder, ACopyLeavesRoomForTheModelRuns) {
   std::error_code failed;
   EXPECT_EQ(extentOf(folder / "base", failed).entries, 3U);
   EXPECT_EQ(whyNoRoom(folder / "base", folder.path(), 1), "");
-  EXPECT_THAT(whyNoRoom(folder / "base", folder.path(), 2'000'000'000), testing::StartsWith("it needs 0.0 MB of the "));
+  EXPECT_THAT(whyNoRoom(folder / "base", folder.path(), 2'000'000'000), testing::StartsWith("it needs 0.0 MB, and "));
 }
 
 // A setup that lies in the model's own folder has what its runs make in what it copies.

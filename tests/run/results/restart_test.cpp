@@ -199,7 +199,9 @@ TEST_F(EarlierRunTest, WithoutItsSettingsOrItsHeaderItIsRefused) {
       {std::string(kHeader) + row(1), "# nothing\n", "setup_Optimisation_Restart.dat"},
       {"# Mirevo 1\n" + damaged, "", "setup_Optimisation.dat has no header row that can be read\nRestart = 0 starts"},
       {damaged, "", kNoRuns},
-      {std::string(kHeader) + row(1), settings, "setup_Optimisation.dat has other columns than"}};
+      {std::string(kHeader) + row(1), settings, "setup_Optimisation.dat has other columns than"},
+      {"# Setup file: /old/x.kdx\n" + std::string(kHeader) + row(1), settings,
+       "setup_Optimisation.dat names another setup, /old/x.kdx. If "}};
   for (const auto& [results, written, detail] : cases) {
     folder_.write("setup_Optimisation.dat", results);
     if (!written.empty()) folder_.write("setup_Optimisation_Restart.dat", written);

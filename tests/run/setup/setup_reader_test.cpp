@@ -60,6 +60,8 @@ TEST_F(SetupReaderTest, RefusesWhatCannotBeReadAndSaysWhere) {
       {"Max_No_Evaluations = 500 => 2147483648", "STOPPING_CRITERIA",
        "146:28: Max_No_Evaluations: expected an integer within 32 bits, found 2147483648"},
       {"Option = 2 => 2, 3", "MIREVO_SIMULATION_OPTION", "3:17: Option: expected one value, found 2"},
+      {"Initial_Value = 412.5 => 412,5", "PARAMETER_1",
+       "26:27: Initial_Value: expected one value, found 2: numbers have a decimal point, a comma separates values"},
       {"'Upper catchment   ' => 2001-01-31", "MIREVO_SIMULATION_OPTION",
        "4:13: Title: expected a text between quotes, found the date 2001-01-31 00:00"},
       {title(longText), "MIREVO_SIMULATION_OPTION", "4:13: Title: expected a text of at most 255 bytes, found 256"},
@@ -246,8 +248,10 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatAreSeldomMeant)
        "its 2 sets are the same: a search proposes nothing else among equal points"},
       {"Initial_Sample_File_Name = 'sample.txt' => 'steps.txt' & Transformation_Type = 1 => 2 & "
        "Initial_Value = 412.5 => 412",
-       "Initial_Sample_File_Name: 1 of the 3 values of the integer parameter \"Depth\" are not whole numbers of steps "
-       "above Lower_Bound = 100; of the first, 200.5, 200 is taken\n"},
+       "Initial_Sample_File_Name: 1 of the 3 values of the integer parameter \"Depth\" is between its steps: 200.5 is "
+       "not a whole number of steps above Lower_Bound = 100, 200 is taken\n"},
+      {"TqSEKdxListItemCount = 1\n      [CONSTRAINT_1] => TqSEKdxListItemCount = 0\n      [CONSTRAINT_1]",
+       "TqSEKdxListItemCount: 1 section CONSTRAINT_n is here, those beyond 0 are not read: CONSTRAINT_1"},
       {"Left_Equation = 'Rate' => '(Rate) < Depth' & Right_Equation = 'Depth' => '3'",
        "setup.kdx:51:25: Left_Equation: the value of a comparison is 0 or 1, with which this constraint is always "
        "met: "},
@@ -273,8 +277,14 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatAreSeldomMeant)
        "setup.kdx:28:21: Upper_Bound: the bounds leave one value to every variable parameter: all sets of the search "
        "are the same"},
       {"Algorithm_Type = 1 => 2 & Use_Surrogate_Model = 1 => 0 & Initial_Value = 412.5 => 100 & Upper_Bound = 900 => "
-       "100 & NoSimultaneousSim = 4 => 1",
+       "100 & NoSimultaneousSim = 4 => 1 & Initial_Sample_Generation = 4 => 0 & 'sample.txt' => ''",
        ""},
+      {"Algorithm_Type = 1 => 2 & Use_Surrogate_Model = 1 => 0 & NoSimultaneousSim = 4 => 1",
+       "Initial_Sample_Generation: 4 has no effect: Dynamically Dimensioned Search starts from the initial values "
+       "alone"},
+      {"Algorithm_Type = 1 => 2 & Use_Surrogate_Model = 1 => 0 & NoSimultaneousSim = 4 => 1 & "
+       "Include_Initial_Parameters = 1 => 0",
+       "4 has no effect: Dynamically Dimensioned Search draws its start points uniformly"},
       {"TqSEKdxListItemCount = 1 // files => TqSEKdxListItemCount = 2\n[SIMPARAMITEM_2]\nParamFileName = "
        "'model/soil.par'\nTemplateFileName = 'model/soil.tpl'\n[/SIMPARAMITEM_2]",
        "setup.kdx:14:17: ParamFileName: SIMPARAMITEM_1 writes this file, too; the model gets what is written last, "

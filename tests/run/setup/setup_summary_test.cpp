@@ -48,6 +48,13 @@ TEST_F(SetupSummaryTest, TheTaskSaysWhatIsRunAndHowOften) {
       {"Option = 2 => 1 & Differencing = 1 => 0", 3,
        "Sensitivity analysis: Local sensitivity analysis, forward differences"},
       {"Option = 2 => 1", 5, "Sensitivity analysis: Local sensitivity analysis, central differences"},
+      // A choice; a value at its bound; a constraint that leaves one side of both.
+      {"Option = 2 => 1 & Transformation_Type = 1 => 2 & Initial_Value = 412.5 => 101 & Upper_Bound = 900 => 103", 3,
+       "Sensitivity analysis: Local sensitivity analysis, central differences"},
+      {"Option = 2 => 1 & Initial_Value = 0.31D0 => 1", 4,
+       "Sensitivity analysis: Local sensitivity analysis, central differences"},
+      {"Option = 2 => 1 & Left_Equation = 'Rate' => 'Rate + 412.185'", 3,
+       "Sensitivity analysis: Local sensitivity analysis, central differences"},
       {"Option = 2 => 3 & Uncertainty_Type = 1 => 0", 200, "Uncertainty analysis: simple random sampling"},
       {"Option = 2 => 3", 200, "Uncertainty analysis: Latin hypercube sampling"},
       {"Option = 2 => 4", 0, "none"},

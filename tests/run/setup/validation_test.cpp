@@ -146,6 +146,8 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
       {"Logical_Operator = 1 => 4", "Invalid logical operator in CONSTRAINT_1", ""},
       {"Logical_Operator = 1 => '=='", "Unable to read keyword in section CONSTRAINT_1 in KDX file",
        "found the text \"==\"; what must be equal needs two constraints, '<=' and '>='"},
+      {"Logical_Operator = 1 => '<>'", "Unable to read keyword in section CONSTRAINT_1 in KDX file",
+       "found the text \"<>\"; what must differ needs the equation abs(left - right) and '>' 0"},
       {"Aggregation_Method = 0 => 4", "Objective function aggregation method invalid", ""},
       {"Interface_Type = 0 => 2", "Interface type invalid for output measure Flow error", ""},
       {"Statistic_Type = 1 => 5", "Statistic type invalid for output measure Flow error", ""},
