@@ -177,8 +177,7 @@ void ReportBuilder::noteChangedSetup() {
   constexpr std::size_t kMostChanges = 5;
   const auto source = readSettings(filePrefix_, config_.task->facts().resultFiles);
   if (!source.content) {
-    if (!source.reason.empty())
-      note(fmt::format("Whether the setup was changed since is not known: {}.", source.reason));
+    note(fmt::format("Whether the setup was changed since is not known: {}.", source.reason));
     return;
   }
   const std::vector<std::string> changes = changedSettings(*source.content, restartSettings(config_));
@@ -290,9 +289,8 @@ void ReportBuilder::addSeries() {
     return;
   }
   data_.series = *std::move(source.content);
-  if (data_.series.isCutOff()) {
-    note(fmt::format("{} is cut off or damaged: {} of its {} rows can be read.", source.file, data_.series.rowCount(),
-                     *data_.series.rowsWritten));
+  if (const std::string remains = data_.series.remains(); !remains.empty()) {
+    note(fmt::format("{} is cut off or damaged: {}.", source.file, remains));
   }
   if (!data_.series.isOf(data_.run.task)) {
     note(

@@ -137,8 +137,6 @@ OptionalSource<PairsByNumber> readPairs(const std::string& filePrefix, const Res
 OptionalSource<RestartSettings> readSettings(const std::string& filePrefix, const ResultFileNames& names) {
   const std::string path = runFilePath(filePrefix, names.restart);
   OptionalSource<RestartSettings> source{{}, fileNameOf(path), {}};
-  std::error_code ignored;
-  if (!std::filesystem::exists(path, ignored)) return source;
   std::string reason;
   if (const auto text = readTextFile(path, reason)) {
     source.content = parseRestartSettings(*text);

@@ -45,7 +45,7 @@ std::optional<RunSources> readRunSources(const RunConfig& config, const SearchSp
 
 OptionalSource<std::vector<FailureRow>> readFailures(const std::string& filePrefix, const ResultFileNames& names);
 OptionalSource<PairsByNumber> readPairs(const std::string& filePrefix, const ResultFileNames& names);
-/// The settings with which the results were computed; without a reason if an earlier version wrote none.
+/// The settings with which the results were computed.
 OptionalSource<RestartSettings> readSettings(const std::string& filePrefix, const ResultFileNames& names);
 OptionalSource<SeriesTable> readSeries(const std::string& filePrefix);
 

@@ -327,13 +327,12 @@ void RunDriver::openSeries() {
     if (!earlier && std::filesystem::exists(path, ignored)) {
       state_.log.warning(fmt::format("The series of the earlier run are not taken up: {}: {}", path, reason));
     }
-    const SeriesTable table = readSeriesTable(earlier.value_or(std::string{}));
+    const SeriesTable table = earlier ? readSeriesTable(*earlier) : SeriesTable{};
     if (table.isOf(task)) {
-      if (table.isCutOff()) {
-        state_.log.warning(fmt::format(
-            "{} is cut off or damaged: only {} of its {} rows are taken up, and the series of the earlier run "
-            "have no values at other times",
-            path, table.rowCount(), *table.rowsWritten));
+      if (const std::string remains = table.remains(); !remains.empty()) {
+        state_.log.warning(
+            fmt::format("{} is cut off or damaged: {}; the series of the earlier run have no values at other times",
+                        path, remains));
       }
       series_->resume(table);
     } else {

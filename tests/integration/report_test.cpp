@@ -216,7 +216,7 @@ TEST(Report, SaysWhatIsMissingInItsFilesAndIsNotMadeOfWhatIsNotThere) {
                         R"("basin_Band_1.csv is cut off or damaged: 366 of its 367 lines are whole."])"));
   folder.editSetup("Restart = 0", "Restart = 1");
   ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0);
-  EXPECT_THAT(reportData(folder), HasSubstr("is cut off or damaged: only 31 of its 365 rows are taken up"));
+  EXPECT_THAT(reportData(folder), HasSubstr("is cut off or damaged: 31 of its 365 rows can be read; the series"));
   // What the setup says now is not what the results depend on.
   cutTo("basin_Series.dat", 0);
   std::filesystem::remove(folder / "basin_Band_1.csv");
@@ -225,10 +225,14 @@ TEST(Report, SaysWhatIsMissingInItsFilesAndIsNotMadeOfWhatIsNotThere) {
   EXPECT_THAT(
       reportData(folder),
       AllOf(HasSubstr("The setup was changed since: Sample_Size of UNCERTAINTY_ESTIMATION: 5 then, 6 now. The "),
+            HasSubstr("basin_Series.dat is cut off or damaged: it ends above its rows."),
             HasSubstr("basin_Band_1.csv is not there, and its band is not shown.")));
   cutTo("basin_Restart.dat", 200);
   EXPECT_EQ(makeReport(folder).exitCode, 0);
   EXPECT_THAT(reportData(folder), HasSubstr("since is not known: basin_Restart.dat: it is cut off or damaged."));
+  std::filesystem::remove(folder / "basin_Restart.dat");
+  EXPECT_EQ(makeReport(folder).exitCode, 0);
+  EXPECT_THAT(reportData(folder), HasSubstr("since is not known: basin_Restart.dat: No such file or directory."));
   folder.editSetup("Sample_Size = 6", "Sample_Size = 5");
   folder.editSetup("Option = 3", "Option = 0");
   EXPECT_THAT(

@@ -270,10 +270,10 @@ void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggreg
                          earlier.unknown, files_.failures));
   }
   if (withoutValues > 0) {
-    log.line(
-        fmt::format("Restart: {} evaluations are made again: {} does not hold their simulated values, or, as one of "
-                    "an earlier version, not with all digits",
-                    withoutValues, files_.simulatedValues));
+    log.line(fmt::format(
+        "Restart: {} evaluations are made again: {} does not hold what it keeps of them beside their rows, or, "
+        "as one of an earlier version, not with all digits",
+        withoutValues, files_.simulatedValues));
   }
   log.line(fmt::format("Restart: {} evaluations are taken from {}", records.size(), files_.results));
   earlierEvaluations_.emplace(space_, aggregator, std::move(records));

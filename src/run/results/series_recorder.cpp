@@ -165,7 +165,7 @@ void SeriesRecorder::finish(const std::optional<BestEvaluation>& best) {
 
 std::string SeriesRecorder::missing(std::string_view which, int number) const {
   return fmt::format("The series of the {} evaluation, No. {}, are not in {}: {}", which, number, fileNameOf(path_),
-                     isContinued_ ? "they were not written yet when the run was interrupted" : "they were not kept");
+                     isContinued_ ? "the earlier run left none of them" : "they were not kept");
 }
 
 /// What a reader of the file cannot see in it.
@@ -177,7 +177,7 @@ std::vector<std::string> SeriesRecorder::notes() const {
     } else if (held->isOfKept) {
       lines.push_back(
           fmt::format("The series of the {} evaluation, No. {}, are there at the times of the observations "
-                      "alone: they were not written yet when the run was interrupted",
+                      "alone: the earlier run left no others",
                       which, number));
     }
   };

@@ -141,6 +141,12 @@ std::size_t SeriesTable::rowCount() const {
   return count;
 }
 
+std::string SeriesTable::remains() const {
+  if (endsInHead) return "it ends above its rows";
+  if (!rowsWritten || rowCount() == *rowsWritten) return {};
+  return fmt::format("{} of its {} rows can be read", rowCount(), *rowsWritten);
+}
+
 std::optional<std::int64_t> readIsoTime(std::string_view text) {
   constexpr std::string_view kPattern = "0000-00-00T00:00:00";
   if (text.size() != kPattern.size()) return std::nullopt;
@@ -219,6 +225,7 @@ SeriesTable readSeriesTable(std::string_view text) {
       readHeadLine(line.substr(2), table);
     }
   }
+  table.endsInHead = !isBelowHeader;
   return table;
 }
 

@@ -40,10 +40,11 @@ struct SeriesTable {
   std::optional<ShownEvaluation> best;
   std::vector<ShownSeries> series;
   std::optional<std::size_t> rowsWritten;  ///< as a file says; nothing in those of earlier versions
+  bool endsInHead = false;                 ///< a file that ends above its rows
 
   std::size_t rowCount() const;
-  /// Whether a file has fewer rows than were written.
-  bool isCutOff() const { return rowsWritten && rowCount() != *rowsWritten; }
+  /// What is left of a file that is cut off or damaged: "31 of its 365 rows can be read"; empty for a whole one.
+  std::string remains() const;
   /// Whether it is of a run of that task, as far as the file says.
   bool isOf(std::string_view otherTask) const { return task.empty() || task == otherTask; }
 };
