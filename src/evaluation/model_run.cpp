@@ -316,6 +316,7 @@ void ModelRunner::updateResistanceNumbers(const std::string& path) {
 EvaluationResult ModelRunner::collect(int slot) {
   EvaluationResult result = judge(slot);
   for (std::string& line : sharedTargets_.takeChanged()) result.warnings.push_back(std::move(line));
+  for (std::string& line : launcher_.takeWarnings()) result.warnings.push_back(std::move(line));
   // A result that may turn out to be cut off must not keep others from being shown.
   if (result.ok() && (mayBeCutOff(result) || shownRuns_.mayBeShown(slot, result.aggregate))) {
     for (const std::size_t i : shownMeasures_) {
