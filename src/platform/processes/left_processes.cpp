@@ -156,7 +156,6 @@ bool LeftProcesses::lookOnce() {
   return hasReaped;
 }
 
-/// Empty if it has ended.
 std::optional<LeftProcesses::Adopted> LeftProcesses::describe(pid_t id) const {
   const auto found = findProcess(id);
   if (!found) return std::nullopt;
@@ -229,7 +228,7 @@ void LeftProcesses::endAll(double seconds) {
   while (true) {
     look();
     bool any = false;
-    for (auto& [id, process] : adopted_) any = ::kill(id, SIGKILL) == 0 || any;
+    for (const auto& [id, process] : adopted_) any = (::kill(id, SIGKILL) == 0 && !process.isGivenUp) || any;
     if (!any || runTimeClock() >= deadline) return;
     const timespec pause{0, 1'000'000};
     ::nanosleep(&pause, nullptr);

@@ -32,24 +32,6 @@ void forEachProcess(Take take) {
   }
 }
 
-/// Also one that has ended and was not reaped yet.
-std::optional<FoundProcess> readProcess(pid_t id) {
-  std::string reason;
-  const auto text = readTextFile("/proc/" + std::to_string(id) + "/stat", reason);
-  if (!text) return std::nullopt;
-  // `id (name) state parent group ...`; the name may hold blanks and parentheses.
-  const auto open = text->find('(');
-  const auto close = text->rfind(')');
-  if (open == std::string::npos || close == std::string::npos || close + 4 > text->size()) return std::nullopt;
-  FoundProcess process{.id = id, .state = (*text)[close + 2], .name = text->substr(open + 1, close - open - 1)};
-  std::replace_if(
-      process.name.begin(), process.name.end(), [](unsigned char c) { return c < ' ' || c == '\x7f'; }, '?');
-  const char* const end = text->data() + text->size();
-  const auto parent = std::from_chars(text->data() + close + 4, end, process.parent);
-  if (parent.ptr == end || std::from_chars(parent.ptr + 1, end, process.group).ec != std::errc()) return std::nullopt;
-  return process;
-}
-
 }  // namespace
 
 ProcessGroupTable::ProcessGroupTable(int entryCount) {
@@ -86,8 +68,19 @@ void haltProcessesFromSignal() noexcept {
 }
 
 std::optional<FoundProcess> findProcess(pid_t id) {
-  auto process = readProcess(id);
-  if (process && (process->state == 'Z' || process->state == 'X')) process.reset();
+  std::string reason;
+  const auto text = readTextFile("/proc/" + std::to_string(id) + "/stat", reason);
+  if (!text) return std::nullopt;
+  // `id (name) state parent group ...`; the name may hold blanks and parentheses.
+  const auto open = text->find('(');
+  const auto close = text->rfind(')');
+  if (open == std::string::npos || close == std::string::npos || close + 4 > text->size()) return std::nullopt;
+  FoundProcess process{.id = id, .state = (*text)[close + 2], .name = text->substr(open + 1, close - open - 1)};
+  std::replace_if(
+      process.name.begin(), process.name.end(), [](unsigned char c) { return c < ' ' || c == '\x7f'; }, '?');
+  const char* const end = text->data() + text->size();
+  const auto parent = std::from_chars(text->data() + close + 4, end, process.parent);
+  if (parent.ptr == end || std::from_chars(parent.ptr + 1, end, process.group).ec != std::errc()) return std::nullopt;
   return process;
 }
 
@@ -95,7 +88,8 @@ std::vector<FoundProcess> runningMembers(std::span<const pid_t> groups) {
   std::vector<FoundProcess> members;
   forEachProcess([&](pid_t id) {
     auto process = findProcess(id);
-    if (process && std::find(groups.begin(), groups.end(), process->group) != groups.end()) {
+    if (process && process->state != 'Z' && process->state != 'X' &&
+        std::find(groups.begin(), groups.end(), process->group) != groups.end()) {
       members.push_back(std::move(*process));
     }
   });
@@ -105,7 +99,7 @@ std::vector<FoundProcess> runningMembers(std::span<const pid_t> groups) {
 std::vector<pid_t> childrenOf(pid_t parent) {
   std::vector<pid_t> children;
   forEachProcess([&](pid_t id) {
-    const auto process = readProcess(id);
+    const auto process = findProcess(id);
     if (process && process->parent == parent) children.push_back(id);
   });
   return children;

@@ -40,11 +40,11 @@ struct FoundProcess {
   pid_t id = 0;
   pid_t parent = 0;
   pid_t group = 0;
-  char state = '?';  ///< 'D': in an uninterruptible wait
+  char state = '?';  ///< 'D': in an uninterruptible wait; 'Z': its first thread, if not all of it, has ended
   std::string name;  ///< without control characters
 };
 
-/// Empty if it has ended, also if it was not reaped yet.
+/// Empty if there is none; one that has ended is there until it is reaped.
 std::optional<FoundProcess> findProcess(pid_t id);
 
 /// The processes of these groups that are still running (zombies excluded), found among all processes of the system,
