@@ -343,7 +343,7 @@ void tryGuard(FaultReport& report) {
       "3`";
   const std::tuple<const char*, std::string, FaultyRun::Environment, const char*> cases[] = {
       {"killed once", "test -e first || " + kill + "; touch first", {}, "was ended by signal 9 (Killed); another one"},
-      {"killed each time", kill, {}, "; no more are started"},
+      {"killed each time", kill, {}, "looked at once a minute"},
       {"old kernel", "", {{"FAULT_OLD", "1"}}, "(pidfd_open: Function not implemented)"}};
   for (const auto& [name, script, environment, told] : cases) {
     FaultyRun run(RunSettings{.option = 3, .maxEvaluations = 30});

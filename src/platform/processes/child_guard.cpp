@@ -15,6 +15,7 @@
 
 #include <fmt/core.h>
 
+#include "common/clock.h"
 #include "common/descriptor.h"
 
 namespace mirevo {
@@ -22,8 +23,10 @@ namespace {
 
 /// Between two looks of a guard that cannot wait for the program's end.
 constexpr int kLookMilliseconds = 200;
-/// Guards are not ended by chance: something that ends this many ends the next one, too.
+/// Guards are not ended by chance: something that ends this many ends the next one, too. From then on they are renewed
+/// rarely.
 constexpr int kMostRenewals = 5;
+constexpr double kRareSeconds = 60.0;
 
 /// Closes all descriptors but one, which may be -1.
 void closeAllBut(int kept) {
@@ -109,17 +112,23 @@ bool ChildGuard::start(std::string& reason) {
 }
 
 std::optional<std::string> ChildGuard::renewIfEnded() {
-  if (renewals_ > kMostRenewals) return std::nullopt;
+  const bool isRare = renewals_ == kMostRenewals;
+  if (isRare && runTimeClock() < nextLook_) return std::nullopt;
   int status = 0;
   const pid_t ended = process_ > 0 ? ::waitpid(process_, &status, WNOHANG) : 0;
   if (process_ > 0 && (ended == 0 || (ended < 0 && errno != ECHILD))) return std::nullopt;
   std::string text = "The guard that ends the model's processes if this program is killed ";
   text += ended > 0 ? howEnded(status) : process_ > 0 ? "has ended" : "is missing";
-  process_ = 0;
   std::string reason;
-  if (++renewals_ <= kMostRenewals && start(reason)) return text + "; another one was started";
-  if (renewals_ <= kMostRenewals) return fmt::format("{}; another one could not be started: {}", text, reason);
-  return text + "; no more are started. Processes that have left their group would outlive a program that is killed";
+  text += start(reason) ? "; another one was started" : "; another one could not be started: " + reason;
+  nextLook_ = runTimeClock() + kRareSeconds;
+  if (isRare) return std::nullopt;
+  if (++renewals_ == kMostRenewals) {
+    text +=
+        ". From now on this is looked at once a minute and not told any more; in between, processes that have left "
+        "their group would outlive a program that is killed";
+  }
+  return text;
 }
 
 }  // namespace mirevo

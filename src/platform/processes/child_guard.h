@@ -28,8 +28,8 @@ class ChildGuard final {
   /// system cannot wake it at its end; else empty.
   const std::string& limitation() const { return limitation_; }
 
-  /// To be called now and then: starts another guard if this one has ended, a few times in all, and returns a line for
-  /// the log, else nothing.
+  /// To be called now and then: starts another guard if this one has ended, a few times at once and then once a minute.
+  /// Returns a line for the log, but for the rare ones.
   std::optional<std::string> renewIfEnded();
 
   /// 0 while there is none.
@@ -39,7 +39,8 @@ class ChildGuard final {
   const ProcessGroupTable& table_;
   const ProcessMark& mark_;
   pid_t process_ = 0;
-  int renewals_ = 0;
+  int renewals_ = 0;       ///< not counting the rare ones
+  double nextLook_ = 0.0;  ///< for a rare one
   std::string limitation_;
 };
 
