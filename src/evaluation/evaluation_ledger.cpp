@@ -63,7 +63,7 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
   result.number = numberOf(place);
   --openCount_;
   if (!leftBehind.empty()) {
-    observer_.warning(progress::nameOfEvaluation(result.number).append(": ").append(leftBehind));
+    observer_.processesLeft(progress::nameOfEvaluation(result.number).append(": ").append(leftBehind));
   }
   warnOfUnusedObservations(result);
   for (const std::string& text : result.warnings) {

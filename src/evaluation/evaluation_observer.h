@@ -21,6 +21,8 @@ class EvaluationObserver {
   virtual void message(std::string_view text) = 0;
   /// A warning for the log alone.
   virtual void warning(std::string_view text) = 0;
+  /// A model run has left processes that had to be ended; `text` names the evaluation and them.
+  virtual void processesLeft(std::string_view text) { warning(text); }
   /// Writes a finished evaluation to disk. Called before anything reports its end, so that nothing is reported as done
   /// that a full disk or a kill could still destroy.
   virtual void recordEvaluation(std::span<const double> set, const EvaluationResult& result) {

@@ -319,6 +319,7 @@ EvaluationResult ModelRunner::collect(int slot) {
   for (std::string& line : sharedTargets_.takeHardLinked(launcher_.getProcessFolder(slot), needs_.outputs)) {
     result.warnings.push_back(std::move(line));
   }
+  for (std::string& line : launcher_.takeWarnings()) result.warnings.push_back(std::move(line));
   // A result that may turn out to be cut off must not keep others from being shown.
   if (result.ok() && (mayBeCutOff(result) || shownRuns_.mayBeShown(slot, result.aggregate))) {
     for (const std::size_t i : shownMeasures_) {

@@ -552,6 +552,7 @@ void RunDriver::logDifferences() {
   reporter_->settle(*aggregator_);
   for (const std::string& text : reporter_->differenceWarnings()) state_.log.warning(text);
   for (const std::string& text : reporter_->differencesOfBest()) state_.log.warning(text);
+  if (const auto text = reporter_->processesLeftWarning()) state_.log.warning(*text);
 }
 
 /// After the message that ends an unfinished run, which is the first thing that the user reads.

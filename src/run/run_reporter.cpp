@@ -16,6 +16,8 @@ namespace {
 
 /// Of each kind in the result file; as warnings in the log, behind which the others are plain lines.
 constexpr std::size_t kMostDifferencesShown = 20;
+/// Model runs whose processes the log names.
+constexpr int kMostLeftShown = 20;
 
 const DifferenceTexts& textsOf(RunDifference::Kind kind) {
   const std::span<const DifferenceTexts> all = differenceTexts();
@@ -42,6 +44,23 @@ void RunReporter::message(std::string_view text) {
 
 void RunReporter::warning(std::string_view text) {
   state_.log.warning(text);
+}
+
+/// The first one is warned of, some more are plain lines, and the others are counted alone.
+void RunReporter::processesLeft(std::string_view text) {
+  ++runsWithProcessesLeft_;
+  if (runsWithProcessesLeft_ == 1) {
+    state_.log.warning(text);
+  } else if (runsWithProcessesLeft_ <= kMostLeftShown) {
+    state_.log.line("   " + std::string(text));
+  }
+}
+
+std::optional<std::string> RunReporter::processesLeftWarning() const {
+  if (runsWithProcessesLeft_ <= 1) return std::nullopt;
+  return fmt::format(
+      "{} model runs left processes running; the log names {}", runsWithProcessesLeft_,
+      runsWithProcessesLeft_ <= kMostLeftShown ? "them" : fmt::format("those of the first {}", kMostLeftShown));
 }
 
 void RunReporter::recordEvaluation(std::span<const double> set, const EvaluationResult& result) {

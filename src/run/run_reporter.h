@@ -37,6 +37,7 @@ class RunReporter final : public EvaluationObserver {
 
   void message(std::string_view text) override;
   void warning(std::string_view text) override;
+  void processesLeft(std::string_view text) override;
   void recordEvaluation(std::span<const double> set, const EvaluationResult& result) override;
   void evaluationFinished(std::span<const double> set, const EvaluationResult& result) override;
   void evaluationReplayed(std::span<const double> set, const EvaluationResult& result) override;
@@ -62,6 +63,8 @@ class RunReporter final : public EvaluationObserver {
   std::vector<std::string> differenceWarnings() const;
   /// Sentences that say so of the best evaluation.
   std::vector<std::string> differencesOfBest() const;
+  /// A sentence that says how many model runs left processes running, if there was more than one.
+  std::optional<std::string> processesLeftWarning() const;
   /// The first successful run and the evaluations that differ or have other pairs; empty as long as it is not known
   /// which is the first successful one.
   std::set<int> numbersWithPairs() const;
@@ -108,6 +111,7 @@ class RunReporter final : public EvaluationObserver {
   std::map<std::tuple<RunDifference::Kind, int, std::size_t>, RunDifference> differences_;
   std::set<int> others_;                 ///< evaluations without such a difference, with pairs of other observations
   std::size_t differencesWarnedOf_ = 0;  ///< one by one
+  int runsWithProcessesLeft_ = 0;
 };
 
 }  // namespace mirevo

@@ -10,6 +10,7 @@
 //                  so do all after it; "short": a write takes half of the bytes and the next one fails. A line
 //                  "failed" goes to the record when the call is met.
 //   FAULT_KILL     the program is killed (SIGKILL) at its call of this number, from 1, before it is made
+//   FAULT_OLD      a kernel that has no pidfds and no close_range
 //   FAULT_CLOCK    that many seconds are taken from the time of day, once more with each look at it
 //
 // The calls go to the C library's own functions. The library keeps no open file and allocates nothing, so that the
@@ -52,6 +53,7 @@ struct Settings {
   bool isShort = false;
   long killAt = 0;
   long clockStep = 0;
+  bool isOld = false;
 };
 Settings settings;
 long callsMade = 0;
@@ -97,6 +99,7 @@ __attribute__((constructor)) void initialise() {
   copyText(settings.record, std::getenv("FAULT_RECORD"));
   if (const char* fault = std::getenv("FAULT")) readFault(fault);
   if (const char* kill = std::getenv("FAULT_KILL")) settings.killAt = std::atol(kill);
+  settings.isOld = std::getenv("FAULT_OLD") != nullptr;
   if (const char* clock = std::getenv("FAULT_CLOCK")) settings.clockStep = std::atol(clock);
   ::unsetenv("LD_PRELOAD");  // the model's processes start without it
   settings.active = true;
@@ -269,7 +272,22 @@ int clone(int (*function)(void*), void* stack, int flags, void* argument, ...) n
   void* parentId = va_arg(arguments, void*);
   va_end(arguments);
   static auto* const real = original<int(int (*)(void*), void*, int, void*, ...)>("clone");
+  if (settings.isOld) flags &= ~CLONE_PIDFD;  // such a kernel does not look at it
   return fails("clone", "(process)") ? -1 : real(function, stack, flags, argument, parentId);
+}
+
+long syscall(long number, ...) noexcept {
+  std::array<long, 6> values{};
+  va_list arguments;
+  va_start(arguments, number);
+  for (long& value : values) value = va_arg(arguments, long);
+  va_end(arguments);
+  static auto* const real = original<long(long, ...)>("syscall");
+  if (settings.isOld && (number == SYS_pidfd_open || number == SYS_close_range)) {
+    errno = ENOSYS;
+    return -1;
+  }
+  return real(number, values[0], values[1], values[2], values[3], values[4], values[5]);
 }
 
 int clock_gettime(clockid_t clock, timespec* now) noexcept {

@@ -308,6 +308,56 @@ void tryCutResults(FaultReport& report) {
   }
 }
 
+/// A model whose runs leave a process that spoils the results of the runs after it.
+void tryLeftProcesses(bool isLong, FaultReport& report) {
+  // what starts it in which way
+  constexpr std::pair<const char*, const char*> kCases[] = {
+      {"in its group", "sh -c '{}' &"},
+      {"in a session of its own", "setsid -f sh -c '{}'"},
+      {"deaf to SIGTERM", "trap \"\" TERM; setsid -f sh -c '{}'"},
+      {"without its environment and folder", "(cd /; env -i PATH=$PATH setsid -f setsid -f sh -c '{}')"}};
+  for (const auto& [way, start] : kCases) {
+    for (const int slots : {1, 2}) {
+      if (!isLong && slots == 1) continue;
+      const TemporaryFolder outside;
+      const std::string spoil = "sleep 0.1; for i in `seq 500`; do cp '$F'/run.sh '$F'/simulated.csv; sleep 0.01; done";
+      FaultyRun run(RunSettings{.option = 3, .maxEvaluations = 10, .slots = slots},
+                    fmt::format("{0} \"$@\" || exit 1\ntest -e {1}/armed && {{\nF=$PWD\n{2}\nsleep 0.03\n}}\nexit 0",
+                                MIREVO_TEST_MODEL, outside.path(), fmt::format(fmt::runtime(start), spoil)));
+      run.makeReference();
+      outside.write("armed", "");
+      run.reset();
+      auto problems = run.check(run.run({}), {.mayPassSilently = true, .exitCode = 0});
+      const std::string log = run.folder().read("basin.log");
+      if (occurrences(log, " running, which w") != 10) problems.push_back("not named for each evaluation");
+      for (const std::string& problem : run.checkOutputs()) problems.push_back(problem);
+      report.tried("processes left", fmt::format("{}, {} slots", way, slots), problems);
+    }
+  }
+}
+
+/// Without its guard, or where it cannot wait for the program's end, a run ends as ever, and what is lost is told.
+void tryGuard(FaultReport& report) {
+  const std::string kill =
+      "kill -9 `grep -ls mirevo_guard $(sed 's:[0-9]*:/proc/&/comm:g' /proc/$PPID/task/$PPID/children) | cut -d / -f "
+      "3`";
+  const std::tuple<const char*, std::string, FaultyRun::Environment, const char*> cases[] = {
+      {"killed once", "test -e first || " + kill + "; touch first", {}, "was ended by signal 9 (Killed); another one"},
+      {"killed each time", kill, {}, "looked at once a minute"},
+      {"old kernel", "", {{"FAULT_OLD", "1"}}, "(pidfd_open: Function not implemented)"}};
+  for (const auto& [name, script, environment, told] : cases) {
+    FaultyRun run(RunSettings{.option = 3, .maxEvaluations = 30});
+    run.makeReference();
+    run.folder().useScript(script);
+    run.reset();
+    const ProgramResult result = run.run(environment.empty() ? environment : run.injection(environment));
+    auto problems = run.check(result, {.mayPassSilently = true, .exitCode = 0});
+    if (run.folder().read("basin.log").find(told) == std::string::npos)
+      problems.push_back("the log does not tell of it");
+    report.tried("guard", name, problems);
+  }
+}
+
 }  // namespace
 
 void tryRealFaults(bool isLong, FaultReport& report) {
@@ -316,6 +366,8 @@ void tryRealFaults(bool isLong, FaultReport& report) {
   tryRemovedFiles(report);
   tryCutResults(report);
   tryDamagedFolders(report);
+  tryLeftProcesses(isLong, report);
+  tryGuard(report);
   tryKeptFolders(isLong, report);
   tryFullDisk(isLong, report);
 }

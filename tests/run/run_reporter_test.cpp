@@ -175,6 +175,17 @@ TEST_F(RunReporterTest, EvaluationsThatDifferFromTheFirstSuccessfulRunAreNamed) 
   EXPECT_EQ(left.count(3), 0U);
 }
 
+TEST_F(RunReporterTest, ProcessesThatRunsLeaveAreWarnedOfOnceAndCounted) {
+  reporter_.processesLeft("No. 1: a");
+  EXPECT_FALSE(reporter_.processesLeftWarning());
+  for (int i = 2; i <= 22; ++i) reporter_.processesLeft(fmt::format("No. {}: a", i));
+  const std::string log = folder_.read("s.log");
+  EXPECT_THAT(log, AllOf(HasSubstr("Warning: No. 1: a\n"), HasSubstr("\n   No. 20: a\n"), Not(HasSubstr("No. 21"))));
+  EXPECT_EQ(state_.log.warningCount(), 1);
+  EXPECT_EQ(reporter_.processesLeftWarning(),
+            "22 model runs left processes running; the log names those of the first 20");
+}
+
 TEST_F(RunReporterTest, AnEvaluationReachesResultFileLogProgressAndTheFileOfFailures) {
   reporter_.message("Evaluation of parameter set No. 1 initiated");
   finish(1, 2.5);

@@ -1,21 +1,58 @@
 #include "platform/processes/child_guard.h"
 
+#include <algorithm>
 #include <cerrno>
 #include <climits>
 #include <csignal>
 #include <cstring>
+#include <ctime>
 #include <poll.h>
 #include <sys/prctl.h>
+#include <sys/resource.h>
 #include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <fmt/core.h>
+
+#include "common/clock.h"
+#include "common/descriptor.h"
+
 namespace mirevo {
 namespace {
 
+/// Between two looks of a guard that cannot wait for the program's end.
+constexpr int kLookMilliseconds = 200;
+/// Guards are not ended by chance: something that ends this many ends the next one, too. From then on they are renewed
+/// rarely.
+constexpr int kMostRenewals = 5;
+constexpr double kRareSeconds = 60.0;
+
+/// Closes all descriptors but one, which may be -1.
+void closeAllBut(int kept) {
+  const auto before = static_cast<unsigned>(std::max(kept, 0));
+  const bool hasRange = (kept <= 0 || ::syscall(SYS_close_range, 0U, before - 1, 0U) == 0) &&
+                        ::syscall(SYS_close_range, kept < 0 ? 0U : before + 1, UINT_MAX, 0U) == 0;
+  if (hasRange) return;
+  constexpr rlim_t kMost = 65536;
+  rlimit limit{};
+  const rlim_t count = ::getrlimit(RLIMIT_NOFILE, &limit) == 0 ? std::min(limit.rlim_cur, kMost) : kMost;
+  for (int fd = 0; fd < static_cast<int>(count); ++fd) {
+    if (fd != kept) ::close(fd);
+  }
+}
+
+/// Returns when the program has ended. `watched` is a pidfd of the program, or -1.
+void awaitEnd(pid_t program, int watched) {
+  while (::getppid() == program) {
+    pollfd poll{watched, POLLIN, 0};  // one with a negative descriptor is a mere pause
+    if (::poll(&poll, 1, watched < 0 ? kLookMilliseconds : -1) > 0) return;
+  }
+}
+
 /// The guard's process. Makes only async-signal-safe calls: threads of the program (of its MPI library) may have held a
 /// lock at the fork.
-[[noreturn]] void guard(pid_t parent, const ProcessGroupTable& table, const ProcessMark& mark) {
+[[noreturn]] void guard(pid_t program, int watched, const ProcessGroupTable& table, const ProcessMark& mark) {
   // A session of its own keeps the terminal's signals away; signals sent to all processes of the user are ignored.
   ::setsid();
   for (const int signal : {SIGINT, SIGTERM, SIGHUP, SIGQUIT, SIGPIPE, SIGUSR1, SIGUSR2}) ::signal(signal, SIG_IGN);
@@ -23,18 +60,20 @@ namespace {
   ::prctl(PR_SET_NAME, "mirevo_guard");
   // An open descriptor would keep a pipe open whose reader waits for the program's end; a current folder would keep its
   // file system busy.
-  ::syscall(SYS_close_range, 0U, UINT_MAX, 0U);
+  closeAllBut(watched);
   if (::chdir("/") != 0) ::_exit(1);
 
-  const int watched = static_cast<int>(::syscall(SYS_pidfd_open, parent, 0U));
-  if (watched >= 0 && ::getppid() == parent) {
-    pollfd poll{watched, POLLIN, 0};
-    while (::poll(&poll, 1, -1) < 0 && errno == EINTR) {
-    }
-  }
+  awaitEnd(program, watched);
   table.signalAll(SIGKILL);
   mark.endBearers();
   ::_exit(0);
+}
+
+std::string howEnded(int status) {
+  if (!WIFSIGNALED(status)) return fmt::format("has ended with code {}", WEXITSTATUS(status));
+  const char* description = ::sigdescr_np(WTERMSIG(status));
+  return fmt::format("was ended by signal {}{}", WTERMSIG(status),
+                     description == nullptr ? "" : fmt::format(" ({})", description));
 }
 
 }  // namespace
@@ -46,20 +85,50 @@ ChildGuard::~ChildGuard() {
   }
 }
 
-bool ChildGuard::start(const ProcessGroupTable& table, const ProcessMark& mark, std::string& reason) {
-  const pid_t parent = ::getpid();
+bool ChildGuard::start(std::string& reason) {
+  const pid_t program = ::getpid();
+  // Opened here, as the program is certain to be there, and to know whether it can be.
+  const Descriptor watched(static_cast<int>(::syscall(SYS_pidfd_open, program, 0U)));
+  limitation_.clear();
+  if (watched.get() < 0) {
+    limitation_ = fmt::format(
+        "The guard that ends the model's processes if this program is killed looks every {:g} seconds whether it was, "
+        "as it cannot be told so (pidfd_open: {})",
+        kLookMilliseconds / 1000.0, std::strerror(errno));
+  }
   // Blocked during the fork, so that no handler of the program ever runs in the guard.
   sigset_t all;
   sigset_t before;
   ::sigfillset(&all);
   ::sigprocmask(SIG_SETMASK, &all, &before);
   process_ = ::fork();
-  if (process_ == 0) guard(parent, table, mark);
+  if (process_ == 0) guard(program, watched.get(), table_, mark_);
   const int error = errno;
   ::sigprocmask(SIG_SETMASK, &before, nullptr);
   if (process_ > 0) return true;
+  process_ = 0;
   reason = std::strerror(error);
   return false;
+}
+
+std::optional<std::string> ChildGuard::renewIfEnded() {
+  const bool isRare = renewals_ == kMostRenewals;
+  if (isRare && runTimeClock() < nextLook_) return std::nullopt;
+  int status = 0;
+  const pid_t ended = process_ > 0 ? ::waitpid(process_, &status, WNOHANG) : 0;
+  if (process_ > 0 && (ended == 0 || (ended < 0 && errno != ECHILD))) return std::nullopt;
+  std::string text = "The guard that ends the model's processes if this program is killed ";
+  text += ended > 0 ? howEnded(status) : process_ > 0 ? "has ended" : "is missing";
+  std::string reason;
+  text += start(reason) ? "; another one was started" : "; another one could not be started: " + reason;
+  nextLook_ = runTimeClock() + kRareSeconds;
+  if (isRare) return std::nullopt;
+  if (++renewals_ == kMostRenewals) {
+    text +=
+        ". From now on this is looked at once a minute and not told any more; in between, processes that have left "
+        "their group would outlive a program that is killed";
+  }
+  return text;
 }
 
 }  // namespace mirevo

@@ -23,11 +23,11 @@
 
 #include "common/clock.h"
 #include "common/fatal_error.h"
-#include "common/files.h"
 #include "common/paths.h"
 #include "common/run_files.h"
 #include "common/text.h"
 #include "platform/processes/argument_text.h"
+#include "platform/processes/batch_file_hints.h"
 #include "platform/processes/own_files.h"
 #include "platform/processes/process_folder.h"
 
@@ -44,6 +44,12 @@ constexpr std::size_t kOutputLineBytes = 400;
 /// Longest wait for a killed process to end; one that waits for a lost network drive may never end.
 constexpr double kKilledSeconds = 10.0;
 constexpr int kGroupLookMilliseconds = 20;
+/// The same for the rest of a group before the next item, and for what batches have left when the run ends.
+constexpr double kRestSeconds = 5.0;
+constexpr double kLeftSeconds = 2.0;
+/// Between two looks at what a batch has left, and at a batch where the kernel has no pidfd to wait with.
+constexpr double kLeftLookSeconds = 0.002;
+constexpr double kUnwatchedSeconds = 0.02;
 
 std::string baseName(const std::string& path) {
   return std::filesystem::path(path).filename().string();
@@ -58,23 +64,6 @@ int openAboveStandard(const char* path, int flags, unsigned mode) {
   ::close(fd);
   errno = error;
   return moved;
-}
-
-/// A hint if an existing file could not be executed because of its "#!" line, else empty.
-std::string interpreterHint(const std::string& file) {
-  std::array<char, 256> head{};
-  const int fd = ::open(file.c_str(), O_RDONLY | O_CLOEXEC);
-  if (fd < 0) return {};
-  const ssize_t length = ::read(fd, head.data(), head.size());
-  ::close(fd);
-  const std::string_view text(head.data(), static_cast<std::size_t>(std::max<ssize_t>(length, 0)));
-  if (!text.starts_with("#!")) return {};
-  const std::string_view line = text.substr(2, text.find('\n') == std::string_view::npos ? 254 : text.find('\n') - 2);
-  if (line.ends_with('\r')) {
-    return fmt::format("; its first line asks for \"{}\" and ends in a carriage return: save it with LF line ends",
-                       trim(line));
-  }
-  return fmt::format("; its first line asks for \"{}\"", trim(line));
 }
 
 /// The end of a file, at most `kOutputTailBytes`.
@@ -110,19 +99,6 @@ std::string textOf(const FatalError& error) {
   return error.detail().empty() ? error.message() : error.message() + "\n" + error.detail();
 }
 
-/// What a shell tells with its own codes (POSIX.1-2017, 2.8.2) about the batch file.
-std::string meaningOfCode(int status, const std::string& file) {
-  if (status != 126 && status != 127) return {};
-  std::string text = status == 127 ? " (a shell: command not found" : " (a shell: command not executable";
-  std::string ignored;
-  const std::string head = readFileHead(file, ignored).value_or("");
-  if (head.find("\r\n") != std::string::npos) {
-    text +=
-        "; the lines of the file end in CR LF, of which a shell takes CR for part of a word: save it with LF line ends";
-  }
-  return text + ")";
-}
-
 }  // namespace
 
 PosixProcessLauncher::~PosixProcessLauncher() {
@@ -156,6 +132,7 @@ bool PosixProcessLauncher::initialise(const LauncherSettings& settings) {
   baseFolder_ = settings.baseFolder;
   processFolderPrefix_ = settings.processFolderPrefix;
   ownFiles_ = settings.ownFiles;
+  warn_ = settings.warn;
   try {
     std::vector<std::vector<std::string>> arguments;
     for (const BatchItem& item : settings.batchItems) {
@@ -172,10 +149,7 @@ bool PosixProcessLauncher::initialise(const LauncherSettings& settings) {
     prepareEnvironment(settings.useSingleThread);
     groups_ = std::make_unique<ProcessGroupTable>(settings.slotCount);
     groups_->makeCurrent();
-    guard_ = std::make_unique<ChildGuard>();
-    std::string reason;
-    if (!guard_->start(*groups_, mark_, reason))
-      fatalError("Error: Unable to start the guard of the model's processes: " + reason);
+    startGuard();
     lockFolders(settings);
     slots_.reserve(static_cast<std::size_t>(settings.slotCount));
     for (int number = 1; number <= settings.slotCount; ++number) {
@@ -191,6 +165,20 @@ bool PosixProcessLauncher::initialise(const LauncherSettings& settings) {
   }
   lastError_.clear();
   return true;
+}
+
+void PosixProcessLauncher::startGuard() {
+  guard_ = std::make_unique<ChildGuard>(*groups_, mark_);
+  std::string reason;
+  if (!guard_->start(reason)) fatalError("Error: Unable to start the guard of the model's processes: " + reason);
+  if (!guard_->limitation().empty()) warn_ ? warn_(guard_->limitation()) : warnings_.push_back(guard_->limitation());
+  left_ = std::make_unique<LeftProcesses>(mark_, [this](pid_t id) {
+    const auto isGroup = [id](const std::atomic<pid_t>& entry) { return entry.load() == id; };
+    return id == guard_->process() || std::any_of(groups_->entries().begin(), groups_->entries().end(), isGroup);
+  });
+  if (!left_->adopt(reason)) {
+    fatalError("Error: Unable to become the parent of what the model's processes leave: " + reason);
+  }
 }
 
 void PosixProcessLauncher::lockFolders(const LauncherSettings& settings) {
@@ -225,6 +213,8 @@ void PosixProcessLauncher::prepareSlot(const LauncherSettings& settings, int num
   }
   makeProcessFolder(baseFolder_, slot.folder, processFolderPrefix_);
   slot.isMade = true;
+  slot.mark = mark_.variable(number);
+  left_->addSlot(slot.folder);
   makeFilesOwn(slot.folder, baseFolder_, ownFiles_, processFolderPrefix_);
   if (!renewLog(slot)) {
     fatalError(fmt::format("Unable to create {}/{}: {}", slot.folder, run_files::kBatchLog, std::strerror(errno)));
@@ -249,9 +239,8 @@ void PosixProcessLauncher::prepareEnvironment(bool useSingleThread) {
   if (useSingleThread) {
     for (const std::string_view name : kThreadVariables) environmentTexts_.push_back(fmt::format("{}=1", name));
   }
-  environmentTexts_.emplace_back(mark_.variable());
   for (std::string& text : environmentTexts_) environment_.push_back(text.data());
-  environment_.push_back(nullptr);
+  environment_.insert(environment_.end(), 2, nullptr);
 }
 
 bool PosixProcessLauncher::renewFolder(int slotNumber) {
@@ -290,10 +279,11 @@ bool PosixProcessLauncher::renewLog(Slot& slot) {
 
 void PosixProcessLauncher::createProcesses(int slotNumber) {
   Slot& slot = slotAt(slotNumber);
-  assert(slot.pidfd < 0);
+  assert(slot.group == 0 && !slot.isEnding);
   slot.item = 0;
   slot.failure = {};
-  slot.leftBehind.clear();
+  slot.isEnding = true;
+  left_->begin(slotNumber);
   slot.started = clock_();
   slot.overdue.reset();
   if (!renewLog(slot)) {
@@ -308,6 +298,7 @@ void PosixProcessLauncher::createProcesses(int slotNumber) {
 
 void PosixProcessLauncher::startItem(Slot& slot) {
   const SpawnCommand& command = slot.commands[slot.item];
+  environment_[environment_.size() - 2] = slot.mark.data();
   const SpawnSurroundings surroundings{environment_.data(), nullInput_, slot.log, &groupEntry(slot)};
   const SpawnedProcess process = spawnProcess(command, surroundings);
   if (process.error == 0) {
@@ -324,10 +315,10 @@ void PosixProcessLauncher::startItem(Slot& slot) {
 
 void PosixProcessLauncher::isExecuting(int slotNumber, std::int32_t& executing, std::int32_t& status) {
   Slot& slot = slotAt(slotNumber);
-  if (slot.pidfd >= 0) {
+  if (slot.group > 0) {
     // Not reaped (WNOWAIT): until then its number cannot be reused for another group.
     siginfo_t ended{};
-    const int result = ::waitid(P_PIDFD, static_cast<id_t>(slot.pidfd), &ended, WEXITED | WNOHANG | WNOWAIT);
+    const int result = ::waitid(P_PID, static_cast<id_t>(slot.group), &ended, WEXITED | WNOHANG | WNOWAIT);
     if (result == 0 && ended.si_pid != 0) {
       finishItem(slot, ended.si_code, ended.si_status);
     } else if (result == 0) {
@@ -338,7 +329,11 @@ void PosixProcessLauncher::isExecuting(int slotNumber, std::int32_t& executing, 
                       baseName(slot.commands[slot.item].file()) + " has ended, but how could not be learned"};
     }
   }
-  executing = slot.pidfd >= 0 ? 1 : 0;
+  if (slot.group == 0 && slot.isEnding) {
+    const std::string last = baseName(slot.commands[slot.item].file());
+    slot.isEnding = !left_->areGone(slotNumber, last, clock_());
+  }
+  executing = slot.group > 0 || slot.isEnding ? 1 : 0;
   status = static_cast<std::int32_t>(slot.failure.kind == BatchFailure::Kind::none ? BatchStatus::succeeded
                                                                                    : BatchStatus::failed);
 }
@@ -376,13 +371,20 @@ void PosixProcessLauncher::endOverdue(Slot& slot) {
   }
 }
 
-/// Seconds until a running batch must be checked even if it has not ended.
+/// Seconds until a batch that is not over must be checked even if its process has not ended.
 double PosixProcessLauncher::secondsToLook(const Slot& slot) const {
-  constexpr double kNever = std::numeric_limits<double>::infinity();
   constexpr double kShortest = 0.001;
-  if (!slot.overdue) return maxSeconds_ > 0.0 ? std::max(slot.started + maxSeconds_ - clock_(), kShortest) : kNever;
-  const double grace = *slot.overdue + graceSeconds_ - clock_();
-  return grace > 0.0 ? std::max(grace, kShortest) : kNever;  // killed: nothing left to do but wait for its end
+  if (slot.group == 0) return kLeftLookSeconds;
+  const double unwatched = slot.pidfd >= 0 ? std::numeric_limits<double>::infinity() : kUnwatchedSeconds;
+  double limit = 0.0;
+  if (slot.overdue) {
+    limit = *slot.overdue + graceSeconds_ - clock_();
+    if (limit <= 0.0) return unwatched;  // killed: nothing left to do but wait for its end
+  } else {
+    if (maxSeconds_ <= 0.0) return unwatched;
+    limit = slot.started + maxSeconds_ - clock_();
+  }
+  return std::min(std::max(limit, kShortest), unwatched);
 }
 
 /// Reaps the ended first process of the group and ends the processes that it left behind. The group is stopped first,
@@ -390,25 +392,20 @@ double PosixProcessLauncher::secondsToLook(const Slot& slot) const {
 void PosixProcessLauncher::endRestOfGroup(Slot& slot) {
   ::kill(-slot.group, SIGSTOP);
   siginfo_t ignored{};
-  while (::waitid(P_PIDFD, static_cast<id_t>(slot.pidfd), &ignored, WEXITED) < 0 && errno == EINTR) {
+  while (::waitid(P_PID, static_cast<id_t>(slot.group), &ignored, WEXITED) < 0 && errno == EINTR) {
   }
-  ::close(slot.pidfd);
+  if (slot.pidfd >= 0) ::close(slot.pidfd);
   slot.pidfd = -1;
+  while (::waitpid(-slot.group, nullptr, WNOHANG) > 0) {  // those that it did not reap have become this program's
+  }
   // After its first process is reaped, a group without others is gone; one with others keeps its number.
   if (::kill(-slot.group, 0) == 0) {
-    const auto members = runningMembers(std::span(&slot.group, 1));
+    std::vector<FoundProcess> members = runningMembers(std::span(&slot.group, 1));
     ::kill(-slot.group, SIGKILL);
-    if (!members.empty()) {
-      std::string names;
-      for (const GroupMember& member : members) {
-        names += fmt::format("{}{} ({})", names.empty() ? "" : ", ", member.name, member.id);
-      }
-      slot.leftBehind += fmt::format("{}{} left {} running, which {} ended: {}", slot.leftBehind.empty() ? "" : "; ",
-                                     baseName(slot.commands[slot.item].file()),
-                                     members.size() == 1 ? "a process" : fmt::format("{} processes", members.size()),
-                                     members.size() == 1 ? "was" : "were", names);
-      awaitEndOfGroups(std::span(&slot.group, 1), kKilledSeconds);
-    }
+    const bool isLast = slot.item + 1 == slot.commands.size();
+    if (!members.empty())
+      left_->addKilled(numberOf(slot), baseName(slot.commands[slot.item].file()), std::move(members));
+    if (!isLast) awaitEndOfGroups(std::span(&slot.group, 1), kRestSeconds);  // the next item must not meet them
   }
   groupEntry(slot).store(0);
   slot.group = 0;
@@ -419,7 +416,7 @@ BatchFailure PosixProcessLauncher::failure(int slot) const {
 }
 
 std::string PosixProcessLauncher::leftBehind(int slot) const {
-  return slotAt(slot).leftBehind;
+  return textOfLeft(left_->of(slot));
 }
 
 std::vector<std::string> PosixProcessLauncher::lastOutput(int slot, int lineCount) const {
@@ -433,26 +430,32 @@ std::vector<std::string> PosixProcessLauncher::lastOutput(int slot, int lineCoun
 
 void PosixProcessLauncher::waitForChange(double seconds) {
   std::vector<pollfd> watched;
+  bool isNeeded = false;
   for (const Slot& slot : slots_) {
-    if (slot.pidfd < 0) continue;
-    watched.push_back({slot.pidfd, POLLIN, 0});
+    if (slot.group == 0 && !slot.isEnding) continue;
+    isNeeded = true;
     seconds = std::min(seconds, secondsToLook(slot));
+    if (slot.pidfd >= 0) watched.push_back({slot.pidfd, POLLIN, 0});
   }
-  if (watched.empty()) return;
+  if (!isNeeded) return;
   const double whole = std::floor(std::max(seconds, 0.0));
   const timespec timeout{static_cast<time_t>(whole), static_cast<long>((std::max(seconds, 0.0) - whole) * 1e9)};
   ::ppoll(watched.data(), watched.size(), &timeout, nullptr);  // a signal ends the wait, as it should
+  left_->look();
+  if (auto text = guard_->renewIfEnded()) warnings_.push_back(std::move(*text));
 }
 
 void PosixProcessLauncher::haltProcesses() {
   haltGroups();
+  for (Slot& slot : slots_) slot.isEnding = false;
+  if (left_) left_->endAll(kLeftSeconds);
   if (guard_) mark_.endBearers();  // without a guard no process was started
 }
 
 void PosixProcessLauncher::haltGroups() {
   std::vector<pid_t> running;
   for (const Slot& slot : slots_) {
-    if (slot.pidfd >= 0) running.push_back(slot.group);
+    if (slot.group > 0) running.push_back(slot.group);
   }
   if (running.empty()) return;
   // The first processes of the groups are not reaped until the end, so that their numbers are not reused.
@@ -461,11 +464,12 @@ void PosixProcessLauncher::haltGroups() {
   groups_->signalAll(SIGKILL);
   awaitEndOfGroups(running, kKilledSeconds);
   for (Slot& slot : slots_) {
-    if (slot.pidfd < 0) continue;
+    if (slot.group == 0) continue;
     siginfo_t ignored{};
-    ::waitid(P_PIDFD, static_cast<id_t>(slot.pidfd), &ignored, WEXITED | WNOHANG);
-    ::close(slot.pidfd);
+    ::waitid(P_PID, static_cast<id_t>(slot.group), &ignored, WEXITED | WNOHANG);
+    if (slot.pidfd >= 0) ::close(slot.pidfd);
     slot.pidfd = -1;
+    slot.group = 0;
     groupEntry(slot).store(0);
     slot.failure = {BatchFailure::Kind::signal, SIGTERM,
                     baseName(slot.commands[slot.item].file()) + " was ended because the run ends"};

@@ -5,6 +5,7 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <string_view>
 #include <sys/types.h>
 #include <utility>
 #include <vector>
@@ -12,6 +13,7 @@
 #include "common/clock.h"
 #include "common/file_lock.h"
 #include "platform/processes/child_guard.h"
+#include "platform/processes/left_processes.h"
 #include "platform/processes/process_groups.h"
 #include "platform/processes/process_launcher.h"
 #include "platform/processes/process_mark.h"
@@ -21,8 +23,8 @@ namespace mirevo {
 
 /// Runs batches as processes of this machine. Each item of a batch is a process group of its own; the output of the
 /// batch goes to `mirevo_batch.log` in the slot's folder. When the first process of an item ends, the rest of its group
-/// is ended. A process that has left the group on purpose (a daemon) may serve later runs. No process of a batch
-/// outlives this program, however it ends.
+/// is ended. A process that has left the group (a daemon) may serve later items, and is ended when the batch is over,
+/// which counts as executing until it is gone. No process of a batch outlives this program, however it ends.
 class PosixProcessLauncher final : public ProcessLauncher {
  public:
   /// Seconds from an arbitrary origin, never decreasing.
@@ -39,6 +41,7 @@ class PosixProcessLauncher final : public ProcessLauncher {
   void isExecuting(int slot, std::int32_t& executing, std::int32_t& status) override;
   BatchFailure failure(int slot) const override;
   std::string leftBehind(int slot) const override;
+  std::vector<std::string> takeWarnings() override { return std::exchange(warnings_, {}); }
   std::vector<std::string> lastOutput(int slot, int lineCount) const override;
   void waitForChange(double seconds) override;
   void haltProcesses() override;
@@ -50,21 +53,24 @@ class PosixProcessLauncher final : public ProcessLauncher {
     bool isMade = false;                 ///< the folder, by this run
     std::vector<SpawnCommand> commands;  ///< one per batch item
     std::size_t item = 0;                ///< the item that runs, or ran last
-    int pidfd = -1;                      ///< -1 while nothing runs
-    pid_t group = 0;
-    double started = 0.0;           ///< when the batch began
-    std::optional<double> overdue;  ///< when it was sent SIGTERM because it ran too long
-    int log = -1;                   ///< open for the whole run, so that a model run that prints nothing creates no file
+    pid_t group = 0;                     ///< also its first process, which is not reaped yet; 0 while no item runs
+    int pidfd = -1;                      ///< of that process; -1 where the kernel has none
+    bool isEnding = false;               ///< no item runs, and what the batch has left may not be gone yet
+    std::string mark;                    ///< in the environment of its processes
+    double started = 0.0;                ///< when the batch began
+    std::optional<double> overdue;       ///< when it was sent SIGTERM because it ran too long
+    int log = -1;  ///< open for the whole run, so that a model run that prints nothing creates no file
     BatchFailure failure;
-    std::string leftBehind;
   };
 
   Slot& slotAt(int slot) { return slots_.at(static_cast<std::size_t>(slot - 1)); }
   const Slot& slotAt(int slot) const { return slots_.at(static_cast<std::size_t>(slot - 1)); }
+  int numberOf(const Slot& slot) const { return static_cast<int>(&slot - slots_.data()) + 1; }
   void lockFolders(const LauncherSettings& settings);
   void prepareSlot(const LauncherSettings& settings, int number,
                    const std::vector<std::vector<std::string>>& arguments);
   void prepareEnvironment(bool useSingleThread);
+  void startGuard();
   bool renewLog(Slot& slot);
   void startItem(Slot& slot);
   void finishItem(Slot& slot, int code, int status);
@@ -86,10 +92,13 @@ class PosixProcessLauncher final : public ProcessLauncher {
   std::vector<Slot> slots_;
   ProcessMark mark_;
   std::vector<std::string> environmentTexts_;
-  std::vector<char*> environment_;
+  std::vector<char*> environment_;  ///< the last but one is the slot's mark
   int nullInput_ = -1;
   std::unique_ptr<ProcessGroupTable> groups_;
   std::unique_ptr<ChildGuard> guard_;
+  std::unique_ptr<LeftProcesses> left_;
+  std::function<void(std::string_view)> warn_;
+  std::vector<std::string> warnings_;
 };
 
 }  // namespace mirevo

@@ -7,8 +7,10 @@
 #include <dirent.h>
 #include <memory>
 #include <new>
-#include <optional>
+#include <string_view>
 #include <sys/mman.h>
+#include <system_error>
+#include <utility>
 
 #include "common/files.h"
 
@@ -19,25 +21,15 @@ std::atomic<const ProcessGroupTable*> currentTable{nullptr};
 
 static_assert(std::atomic<pid_t>::is_always_lock_free && std::atomic<const ProcessGroupTable*>::is_always_lock_free);
 
-/// A process of /proc; empty if it has ended in the meantime or is a zombie.
-std::optional<GroupMember> readProcess(const std::string& id) {
-  std::string reason;
-  const auto text = readTextFile("/proc/" + id + "/stat", reason);
-  if (!text) return std::nullopt;
-  // `id (name) state parent group ...`; the name may hold blanks and parentheses.
-  const auto open = text->find('(');
-  const auto close = text->rfind(')');
-  if (open == std::string::npos || close == std::string::npos || close + 4 > text->size()) return std::nullopt;
-  const char state = (*text)[close + 2];
-  if (state == 'Z' || state == 'X') return std::nullopt;
-  GroupMember process;
-  process.name = text->substr(open + 1, close - open - 1);
-  std::from_chars(id.data(), id.data() + id.size(), process.id);
-  const auto parent = close + 4;
-  const auto group = text->find(' ', parent);
-  if (group == std::string::npos) return std::nullopt;
-  std::from_chars(text->data() + group + 1, text->data() + text->size(), process.group);
-  return process;
+/// Passes the number of every process of the system to `take`.
+template <class Take>
+void forEachProcess(Take take) {
+  const std::unique_ptr<DIR, int (*)(DIR*)> folder(::opendir("/proc"), &::closedir);
+  while (const dirent* entry = folder ? ::readdir(folder.get()) : nullptr) {
+    const std::string_view name = entry->d_name;
+    pid_t id = 0;
+    if (std::from_chars(name.data(), name.data() + name.size(), id).ec == std::errc()) take(id);
+  }
 }
 
 }  // namespace
@@ -75,18 +67,42 @@ void haltProcessesFromSignal() noexcept {
   errno = saved;
 }
 
-std::vector<GroupMember> runningMembers(std::span<const pid_t> groups) {
-  std::vector<GroupMember> members;
-  const std::unique_ptr<DIR, int (*)(DIR*)> folder(::opendir("/proc"), &::closedir);
-  if (!folder) return members;
-  while (const dirent* entry = ::readdir(folder.get())) {
-    if (entry->d_name[0] < '0' || entry->d_name[0] > '9') continue;
-    auto process = readProcess(entry->d_name);
-    if (process && std::find(groups.begin(), groups.end(), process->group) != groups.end()) {
+std::optional<FoundProcess> findProcess(pid_t id) {
+  std::string reason;
+  const auto text = readTextFile("/proc/" + std::to_string(id) + "/stat", reason);
+  if (!text) return std::nullopt;
+  // `id (name) state parent group ...`; the name may hold blanks and parentheses.
+  const auto open = text->find('(');
+  const auto close = text->rfind(')');
+  if (open == std::string::npos || close == std::string::npos || close + 4 > text->size()) return std::nullopt;
+  FoundProcess process{.id = id, .state = (*text)[close + 2], .name = text->substr(open + 1, close - open - 1)};
+  std::replace_if(
+      process.name.begin(), process.name.end(), [](unsigned char c) { return c < ' ' || c == '\x7f'; }, '?');
+  const char* const end = text->data() + text->size();
+  const auto parent = std::from_chars(text->data() + close + 4, end, process.parent);
+  if (parent.ptr == end || std::from_chars(parent.ptr + 1, end, process.group).ec != std::errc()) return std::nullopt;
+  return process;
+}
+
+std::vector<FoundProcess> runningMembers(std::span<const pid_t> groups) {
+  std::vector<FoundProcess> members;
+  forEachProcess([&](pid_t id) {
+    auto process = findProcess(id);
+    if (process && process->state != 'Z' && process->state != 'X' &&
+        std::find(groups.begin(), groups.end(), process->group) != groups.end()) {
       members.push_back(std::move(*process));
     }
-  }
+  });
   return members;
+}
+
+std::vector<pid_t> childrenOf(pid_t parent) {
+  std::vector<pid_t> children;
+  forEachProcess([&](pid_t id) {
+    const auto process = findProcess(id);
+    if (process && process->parent == parent) children.push_back(id);
+  });
+  return children;
 }
 
 }  // namespace mirevo

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <atomic>
+#include <optional>
 #include <span>
 #include <string>
 #include <sys/types.h>
@@ -34,15 +35,23 @@ class ProcessGroupTable final {
 /// Ends (SIGKILL) every running model process. Async-signal-safe: for signal handlers, which must not wait.
 void haltProcessesFromSignal() noexcept;
 
-/// A process found in a group.
-struct GroupMember {
+/// A process of the system.
+struct FoundProcess {
   pid_t id = 0;
+  pid_t parent = 0;
   pid_t group = 0;
-  std::string name;
+  char state = '?';  ///< 'D': in an uninterruptible wait; 'Z': its first thread, if not all of it, has ended
+  std::string name;  ///< without control characters
 };
+
+/// Empty if there is none; one that has ended is there until it is reaped.
+std::optional<FoundProcess> findProcess(pid_t id);
 
 /// The processes of these groups that are still running (zombies excluded), found among all processes of the system,
 /// which takes some milliseconds.
-std::vector<GroupMember> runningMembers(std::span<const pid_t> groups);
+std::vector<FoundProcess> runningMembers(std::span<const pid_t> groups);
+
+/// The children of a process, zombies included, found in the same way.
+std::vector<pid_t> childrenOf(pid_t parent);
 
 }  // namespace mirevo

@@ -75,7 +75,7 @@ class ProcessLauncher {
   virtual void createProcesses(int slot) = 0;
 
   /// `executing` becomes 1 while the slot's batch runs, else 0; `status` is then a BatchStatus. A batch that has run
-  /// too long is ended here, but counts as executing until it is gone.
+  /// too long is ended here, and so are processes that a batch leaves; it counts as executing until they are gone.
   virtual void isExecuting(int slot, std::int32_t& executing, std::int32_t& status) = 0;
 
   /// Why the slot's last batch failed.
@@ -83,6 +83,9 @@ class ProcessLauncher {
 
   /// One line if the slot's last batch left processes behind that had to be ended, else empty.
   virtual std::string leftBehind(int slot) const = 0;
+
+  /// What the user should know of starting and ending processes since the last call, one line each.
+  virtual std::vector<std::string> takeWarnings() { return {}; }
 
   /// The last lines that the slot's last batch printed, at most `lineCount`.
   virtual std::vector<std::string> lastOutput(int slot, int lineCount) const = 0;

@@ -17,6 +17,7 @@
 #include <fmt/core.h>
 
 #include "common/descriptor.h"
+#include "common/files.h"
 
 namespace mirevo {
 namespace {
@@ -80,6 +81,18 @@ ProcessMark::ProcessMark() {
     number = static_cast<std::uint64_t>(now.tv_sec) * 1'000'000'000U + static_cast<std::uint64_t>(now.tv_nsec);
   }
   fmt::format_to_n(text_.data(), text_.size() - 1, "MIREVO_RUN={:016x}", number);
+}
+
+std::string ProcessMark::variable(int slot) const {
+  return fmt::format("{}.{}", text_.data(), slot);
+}
+
+int ProcessMark::slotOf(pid_t process) const {
+  std::string reason;
+  const auto environment = readTextFile(fmt::format("/proc/{}/environ", process), reason);
+  const std::string front = fmt::format("{}.", text_.data());
+  const auto at = environment ? environment->find(front) : std::string::npos;
+  return at == std::string::npos ? 0 : std::atoi(environment->c_str() + at + front.size());
 }
 
 void ProcessMark::endBearers() const noexcept {

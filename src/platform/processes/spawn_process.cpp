@@ -104,9 +104,9 @@ SpawnedProcess spawnProcess(const SpawnCommand& command, const SpawnSurroundings
   } else if (task.failedStep != nullptr) {
     surroundings.groupEntry->store(0);
     siginfo_t ignored{};
-    while (::waitid(P_PIDFD, static_cast<id_t>(process.pidfd), &ignored, WEXITED) < 0 && errno == EINTR) {
+    while (::waitid(P_PID, static_cast<id_t>(process.id), &ignored, WEXITED) < 0 && errno == EINTR) {
     }
-    ::close(process.pidfd);
+    if (process.pidfd >= 0) ::close(process.pidfd);
     process.error = task.error;
     process.failedStep = task.failedStep;
     process.pidfd = -1;

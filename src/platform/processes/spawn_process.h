@@ -44,7 +44,7 @@ struct SpawnSurroundings {
 /// A process that was started, or why it was not.
 struct SpawnedProcess {
   pid_t id = -1;           ///< also its process group
-  int pidfd = -1;          ///< close-on-exec
+  int pidfd = -1;          ///< close-on-exec; -1 where the kernel has none
   int error = 0;           ///< errno; 0 if it was started
   std::string failedStep;  ///< what failed: "started", "entered its folder"
 };

@@ -2,7 +2,12 @@
 
 #include <csignal>
 #include <fcntl.h>
+#include <fstream>
 #include <functional>
+#include <linux/filter.h>
+#include <linux/seccomp.h>
+#include <sys/prctl.h>
+#include <sys/syscall.h>
 #include <sys/wait.h>
 #include <tuple>
 #include <unistd.h>
@@ -193,13 +198,31 @@ TEST_F(PosixProcessLauncherTest, EndsAndNamesWhatABatchLeavesBehind) {
   EXPECT_EQ(launcher_.leftBehind(1), "");
 }
 
-TEST_F(PosixProcessLauncherTest, ADaemonMayServeLaterRunsButDoesNotOutliveThem) {
-  initialise("setsid sh -c 'echo $$ >id.txt; exec sleep 600' &\nwhile ! [ -s id.txt ]; do sleep 0.01; done");
-  EXPECT_EQ(run(), BatchStatus::succeeded);
-  const int daemon = std::stoi(read("id.txt"));
-  EXPECT_TRUE(isRunning(daemon));
-  launcher_.haltProcesses();
-  EXPECT_FALSE(isRunning(daemon));
+TEST_F(PosixProcessLauncherTest, ADaemonMayServeLaterItemsOfItsBatchAndEndsWithIt) {
+  folder_.write("base/serve.sh",
+                "until grep sleep /proc/`cat id.txt`/comm; do kill -0 `cat id.txt` || exit 1; done; echo >served; "
+                "while [ -e stay ]; do sleep 0.01; done\n");
+  settings_.slotCount = 2;
+  for (const std::string start : {"setsid", "cd /; exec env -i setsid"}) {
+    const std::string daemon = "(" + start + " sh -c 'trap \"\" TERM; echo $$ >'$F'/id.txt; exec sleep 600' &)";
+    initialise("F=$PWD; " + daemon + "\nwhile ! [ -s id.txt ]; do sleep 0.01; done");
+    addItem("serve.sh");
+    initialise();
+    folder_.write("run_Process2/stay", "");
+    launcher_.createProcesses(1);
+    launcher_.createProcesses(2);
+    waitUntil([&] { return !isExecuting(2) || hasContent("run_Process2/served"); });
+    EXPECT_EQ(finish(1), BatchStatus::succeeded);
+    const std::string first = read("id.txt");
+    const int second = std::stoi(folder_.read("run_Process2/id.txt"));
+    EXPECT_FALSE(isRunning(std::stoi(first)));
+    EXPECT_TRUE(isRunning(second)) << "the daemon of a slot that is still running";
+    EXPECT_EQ(launcher_.leftBehind(1),
+              "serve.sh left a process running, which was ended: sleep (" + first.substr(0, first.size() - 1) + ")");
+    std::filesystem::remove(folder_ / "run_Process2/stay");
+    EXPECT_EQ(finish(2), BatchStatus::succeeded);
+    EXPECT_FALSE(isRunning(second));
+  }
 }
 
 TEST_F(PosixProcessLauncherTest, SlotsRunAtOnceAndTheWaitEndsWithTheFirst) {
@@ -238,9 +261,38 @@ TEST_F(PosixProcessLauncherTest, HaltingIsGentleFirstAndThenSure) {
   }
 }
 
+/// From now on this process has no pidfd_open, as in a container.
+void denyPidfds() {
+  sock_filter rules[] = {BPF_STMT(BPF_LD | BPF_W | BPF_ABS, 0),  // the number of the call
+                         BPF_JUMP(BPF_JMP | BPF_JEQ | BPF_K, SYS_pidfd_open, 0, 1),
+                         BPF_STMT(BPF_RET | BPF_K, SECCOMP_RET_ERRNO | EPERM),
+                         BPF_STMT(BPF_RET | BPF_K, SECCOMP_RET_ALLOW)};
+  const sock_fprog program{4, rules};
+  ::prctl(PR_SET_NO_NEW_PRIVS, 1L, 0L, 0L, 0L);
+  if (::prctl(PR_SET_SECCOMP, SECCOMP_MODE_FILTER, &program) != 0) ::_exit(9);
+}
+
+/// Kills the guard of this process; the launcher must tell of it once.
+void killGuard(PosixProcessLauncher& launcher) {
+  const std::string self = std::to_string(::getpid());
+  std::ifstream children("/proc/" + self + "/task/" + self + "/children");
+  for (pid_t child = 0; children >> child;) {
+    const std::string name = TemporaryFolder::readFile("/proc/" + std::to_string(child) + "/comm");
+    if (name == "mirevo_guard\n") ::kill(child, SIGKILL);
+  }
+  const auto hasTold = [&launcher] {
+    launcher.waitForChange(0.01);
+    return launcher.takeWarnings().size() == 1;
+  };
+  if (!waitUntil(hasTold)) ::_exit(9);
+}
+
 TEST_F(PosixProcessLauncherTest, NothingOutlivesTheProgram) {
   // Each way for a program to end, with two slots running a shell, a daemon, a model and a stubborn grandchild each.
-  const std::pair<const char*, std::function<void()>> cases[] = {{"kill -9", [] { ::kill(::getpid(), SIGKILL); }},
+  const auto kill = [] { ::kill(::getpid(), SIGKILL); };
+  const std::pair<const char*, std::function<void()>> cases[] = {{"kill -9", kill},
+                                                                 {"kill -9, first its guard", kill},
+                                                                 {"kill -9, without pidfds", kill},
                                                                  {"leaves from a signal handler",
                                                                   [] {
                                                                     ::signal(SIGTERM, [](int) {
@@ -259,11 +311,14 @@ TEST_F(PosixProcessLauncherTest, NothingOutlivesTheProgram) {
   for (const auto& [name, end] : cases) {
     const pid_t program = ::fork();
     if (program == 0) {
+      const bool hasPidfds = std::string(name) != "kill -9, without pidfds";
+      if (!hasPidfds) denyPidfds();
       PosixProcessLauncher launcher;
-      if (!launcher.initialise(settings_)) ::_exit(9);
+      if (!launcher.initialise(settings_) || launcher.takeWarnings().empty() != hasPidfds) ::_exit(9);
       launcher.createProcesses(1);
       launcher.createProcesses(2);
       waitUntil([&] { return hasContent("left_Process1/id.txt") && hasContent("left_Process2/id.txt"); });
+      if (name == std::string("kill -9, first its guard")) killGuard(launcher);
       end();
       ::_exit(9);
     }
