@@ -2,10 +2,10 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <charconv>
 #include <climits>
 #include <cmath>
 #include <csignal>
-#include <cstdio>
 #include <cstring>
 #include <ctime>
 #include <exception>
@@ -21,6 +21,7 @@
 
 #include <fmt/core.h>
 
+#include "common/files.h"
 #include "common/reading_watch.h"
 
 namespace mirevo {
@@ -174,10 +175,10 @@ bool receiveInHelper(int socket, void* bytes, std::size_t size) {
 
 void limitOwnMemory(std::uintmax_t bytes) {
   if constexpr (!kLimitsMemory) return;
-  std::FILE* const file = std::fopen("/proc/self/statm", "re");
-  unsigned long pages = 0;
-  const bool isRead = file != nullptr && std::fscanf(file, "%lu", &pages) == 1;
-  if (file != nullptr) std::fclose(file);
+  std::string ignored;
+  const std::string sizes = readTextFile("/proc/self/statm", ignored).value_or("");
+  rlim_t pages = 0;
+  const bool isRead = std::from_chars(sizes.data(), sizes.data() + sizes.size(), pages).ec == std::errc{};
   rlimit limit{};
   if (!isRead || ::getrlimit(RLIMIT_AS, &limit) != 0) return;
   const rlim_t wanted = pages * static_cast<rlim_t>(::sysconf(_SC_PAGESIZE)) + bytes;
