@@ -81,17 +81,21 @@ std::optional<std::string> readBytes(const std::string& path, std::size_t length
   reason = faultOfKind(status);
   if (reason.empty() && watch != nullptr) reason = whyNoMemory(static_cast<std::uintmax_t>(status.st_size));
   if (!reason.empty()) return std::nullopt;
-  constexpr std::size_t kMostAtOnce = std::size_t{1} << 24;
+  constexpr std::size_t kMostAtOnce = std::size_t{1} << 24;  // of which each part takes a moment
+  const std::size_t expected = std::min(static_cast<std::size_t>(status.st_size), length);
   std::string content;
-  content.resize(std::min(static_cast<std::size_t>(status.st_size), length));
+  content.reserve(expected + 1);  // the last byte is for finding the end without moving the rest
   std::size_t size = 0;
   while (size < length) {
-    if (size == content.size()) content.resize(std::min(content.size() + 65536, length));
+    if (size == content.size()) {
+      const std::size_t more = size == expected && size > 0 ? 1 : 65536;
+      content.resize(size < expected ? std::min(size + kMostAtOnce, expected) : std::min(size + more, length));
+    }
     if (watch != nullptr && watch->isOver()) {
       reason = watch->reason();
       return std::nullopt;
     }
-    const ssize_t got = ::read(file.get(), content.data() + size, std::min(content.size() - size, kMostAtOnce));
+    const ssize_t got = ::read(file.get(), content.data() + size, content.size() - size);
     if (got < 0) {
       if (errno == EINTR) continue;
       reason = std::strerror(errno);
