@@ -1,10 +1,12 @@
 #include "common/file_copy.h"
 
+#include <algorithm>
 #include <array>
 #include <cerrno>
-#include <cstddef>
+#include <cstdint>
 #include <cstring>
 #include <fcntl.h>
+#include <limits>
 #include <linux/fs.h>
 #include <sys/ioctl.h>
 #include <sys/sendfile.h>
@@ -16,7 +18,9 @@
 namespace mirevo {
 namespace {
 
-constexpr std::size_t kCopyChunk = std::size_t{1} << 30;
+constexpr std::uint64_t kCopyChunk = std::uint64_t{1} << 30;
+constexpr off_t kStatBlock = 512;
+constexpr off_t kHolesOfNoMatter = 1'000'000;
 
 /// Whether `from` is a regular file, with its `status`; if not, the reason is in errno.
 bool isFile(int from, struct stat& status) {
@@ -37,18 +41,42 @@ bool copyTo(const std::string& target, int from, const struct stat& status) {
   return ::fchmod(to.get(), status.st_mode & 07777) == 0 && to.close();
 }
 
+/// Copies so many bytes from the offsets on, fewer if the file ends before.
+bool copyBytes(int from, int to, std::uint64_t count) {
+  ssize_t copied = 1;
+  while (count > 0 && (copied = ::copy_file_range(from, nullptr, to, nullptr, std::min(count, kCopyChunk), 0)) > 0) {
+    count -= static_cast<std::uint64_t>(copied);
+  }
+  if (count == 0 || copied == 0) return true;
+  // Both calls advance the offsets only by what was copied, so the next method continues where this one stopped.
+  while (count > 0 && (copied = ::sendfile(to, from, nullptr, std::min(count, kCopyChunk))) > 0) {
+    count -= static_cast<std::uint64_t>(copied);
+  }
+  return count == 0 || copied == 0;
+}
+
+/// Copies what is between the holes of a file: a model may have left one of many gigabytes that is a single hole.
+bool copyAroundHoles(int from, int to, off_t size) {
+  off_t end = 0;
+  off_t begin = 0;
+  while ((begin = ::lseek(from, end, SEEK_DATA)) >= 0) {
+    end = ::lseek(from, begin, SEEK_HOLE);
+    if (end < begin || ::lseek(from, begin, SEEK_SET) < 0 || ::lseek(to, begin, SEEK_SET) < 0) return false;
+    if (!copyBytes(from, to, static_cast<std::uint64_t>(end - begin))) return false;
+  }
+  return errno == ENXIO && ::ftruncate(to, size) == 0;
+}
+
 }  // namespace
 
 bool copyContent(int from, int to) {
   if (::ioctl(to, FICLONE, from) == 0) return true;
-  ssize_t copied = 0;
-  while ((copied = ::copy_file_range(from, nullptr, to, nullptr, kCopyChunk, 0)) > 0) {
-  }
-  if (copied == 0) return true;
-  // Both calls advance the offsets only by what was copied, so the next method continues where this one stopped.
-  while ((copied = ::sendfile(to, from, nullptr, kCopyChunk)) > 0) {
-  }
-  return copied == 0;
+  struct stat status {};
+  const bool hasHoles =
+      ::fstat(from, &status) == 0 && status.st_blocks * kStatBlock < status.st_size - kHolesOfNoMatter;
+  if (hasHoles && (::lseek(from, 0, SEEK_DATA) >= 0 || errno == ENXIO))
+    return copyAroundHoles(from, to, status.st_size);
+  return copyBytes(from, to, std::numeric_limits<std::uint64_t>::max());
 }
 
 bool putBackIfRemoved(int descriptor, const std::string& path) {

@@ -9,9 +9,13 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <fmt/core.h>
+
 #include "common/descriptor.h"
 #include "common/descriptor_output.h"
 #include "common/fatal_error.h"
+#include "common/reading_watch.h"
+#include "common/text.h"
 
 namespace mirevo {
 namespace {
@@ -41,8 +45,32 @@ bool createAnew(const std::string& path, std::string_view content, std::optional
   return error == 0;
 }
 
-/// The first `length` bytes of a file.
-std::optional<std::string> readBytes(const std::string& path, std::size_t length, std::string& reason) {
+std::string sizeText(std::uintmax_t bytes) {
+  return bytes < 1'000'000 ? fmt::format("{} bytes", bytes)
+                           : fmt::format("{:.1f} MB", static_cast<double>(bytes) / 1e6);
+}
+
+/// Why the content of a file of this size is too much for the memory that is free; empty if it is not.
+std::string whyNoMemory(std::uintmax_t size) {
+  constexpr std::uintmax_t kAlwaysThere = 64'000'000;
+  constexpr std::uintmax_t kShare = 2;  // the values take about as much as the text
+  constexpr std::string_view kKey = "MemAvailable:";
+  if (size <= kAlwaysThere) return {};
+  std::string ignored;
+  const std::string table = readTextFile("/proc/meminfo", ignored).value_or("");
+  const std::size_t line = table.find(kKey);
+  if (line == std::string::npos) return {};
+  const std::size_t begin = line + kKey.size();
+  const auto kilobytes = parseReal(std::string_view(table).substr(begin, table.find("kB", begin) - begin));
+  if (!kilobytes) return {};
+  const auto free = static_cast<std::uintmax_t>(*kilobytes * 1024.0);
+  if (kShare * size <= free) return {};
+  return fmt::format("its {} are too many to read with {} of free memory", sizeText(size), sizeText(free));
+}
+
+/// The first `length` bytes of a file. `watch` may be null.
+std::optional<std::string> readBytes(const std::string& path, std::size_t length, std::string& reason,
+                                     ReadingWatch* watch = nullptr) {
   // Without O_NONBLOCK the opening of a pipe would wait for its writer.
   const Descriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
   struct stat status {};
@@ -51,12 +79,22 @@ std::optional<std::string> readBytes(const std::string& path, std::size_t length
     return std::nullopt;
   }
   reason = faultOfKind(status);
+  if (reason.empty() && watch != nullptr) reason = whyNoMemory(static_cast<std::uintmax_t>(status.st_size));
   if (!reason.empty()) return std::nullopt;
+  constexpr std::size_t kMostAtOnce = std::size_t{1} << 24;  // of which each part takes a moment
+  const std::size_t expected = std::min(static_cast<std::size_t>(status.st_size), length);
   std::string content;
-  content.resize(std::min(static_cast<std::size_t>(status.st_size), length));
+  content.reserve(expected + 1);  // the last byte is for finding the end without moving the rest
   std::size_t size = 0;
   while (size < length) {
-    if (size == content.size()) content.resize(std::min(content.size() + 65536, length));
+    if (size == content.size()) {
+      const std::size_t more = size == expected && size > 0 ? 1 : 65536;
+      content.resize(size < expected ? std::min(size + kMostAtOnce, expected) : std::min(size + more, length));
+    }
+    if (watch != nullptr && watch->isOver()) {
+      reason = watch->reason();
+      return std::nullopt;
+    }
     const ssize_t got = ::read(file.get(), content.data() + size, content.size() - size);
     if (got < 0) {
       if (errno == EINTR) continue;
@@ -79,6 +117,22 @@ std::string faultOfFile(const std::string& path) {
 
 std::optional<std::string> readTextFile(const std::string& path, std::string& reason) {
   return readBytes(path, std::numeric_limits<std::size_t>::max(), reason);
+}
+
+std::optional<std::string> readTextFile(const std::string& path, std::string& reason, ReadingWatch& watch) {
+  return readBytes(path, std::numeric_limits<std::size_t>::max(), reason, &watch);
+}
+
+std::string faultOfSize(const std::string& path, std::uintmax_t usualBytes) {
+  constexpr std::uintmax_t kAlwaysRead = 4'000'000'000;
+  constexpr std::uintmax_t kTimesUsual = 100;
+  struct stat status {};
+  if (::stat(path.c_str(), &status) != 0) return {};  // opening it tells more
+  const auto size = static_cast<std::uintmax_t>(status.st_size);
+  if (size <= kAlwaysRead || size / kTimesUsual <= usualBytes) return {};
+  return fmt::format(
+      "its {} are too many: more than {}, and more than {} times the {} of the file in the model's folder",
+      sizeText(size), sizeText(kAlwaysRead), kTimesUsual, sizeText(usualBytes));
 }
 
 std::optional<std::string> readFileHead(const std::string& path, std::string& reason) {

@@ -1,11 +1,14 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <optional>
 #include <string>
 #include <string_view>
 
 namespace mirevo {
+
+class ReadingWatch;
 
 /// Why there is no file at `path` ("No such file or directory", "Is a directory", "Not a regular file" of a device or
 /// pipe); empty where there is one.
@@ -14,6 +17,13 @@ std::string faultOfFile(const std::string& path);
 /// The whole content of a file; empty, with the system's reason in `reason` ("No such file or directory"), on failure.
 /// Folders, devices and pipes are refused like a file that cannot be read.
 std::optional<std::string> readTextFile(const std::string& path, std::string& reason);
+/// The same for a file that may be damaged: ends when the time of `watch` is over, and refuses a file for whose content
+/// there is too little memory.
+std::optional<std::string> readTextFile(const std::string& path, std::string& reason, ReadingWatch& watch);
+
+/// Why a text file that a model wrote, and of which the model's folder has one of `usualBytes`, is not to be read: it
+/// is far larger. Empty if it is not.
+std::string faultOfSize(const std::string& path, std::uintmax_t usualBytes);
 
 inline constexpr std::size_t kFileHeadLength = 16384;  ///< room for the mark of a result behind a long title
 /// The same of the first kFileHeadLength bytes.

@@ -76,7 +76,7 @@ bool LocalEvaluator::takeFinished() {
       std::int32_t status = 0;
       runner_.launcher().isExecuting(slot, executing, status);
       if (executing != 0) continue;
-      running->ended = runner_.collect(slot);
+      running->ended = runner_.collect(slot, [this] { stopIfCancelled(); });
       runner_.keepOutputFiles(slot, ledger_.numberOf(place), *running->ended);
     }
     // The slot waits, too, as the folder of a failed run may be kept.

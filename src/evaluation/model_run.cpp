@@ -5,6 +5,8 @@
 #include <cmath>
 #include <cstring>
 #include <filesystem>
+#include <memory>
+#include <new>
 #include <numeric>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -14,10 +16,12 @@
 #include <fmt/core.h>
 
 #include "common/calendar.h"
+#include "common/clock.h"
 #include "common/fatal_error.h"
 #include "common/file_copy.h"
 #include "common/files.h"
 #include "common/paths.h"
+#include "common/reading_watch.h"
 #include "common/run_files.h"
 #include "common/text.h"
 #include "measures/measure_file.h"
@@ -116,6 +120,7 @@ ModelRunner::ModelRunner(ModelDescription description, ParameterModel& parameter
       shownRuns_(ToModelScale(parameters.searchSpace(), parameters.searchSpace().initial)) {
   requireFilesInBaseFolder();
   LauncherSettings settings = launcherSettings;
+  maxSeconds_ = settings.maxSeconds;
   needs_ = folderNeeds(settings);
   settings.ownFiles = needs_.ownFiles();
   warnings_ = requireOwnFiles(description_.baseFolder, settings.ownFiles);
@@ -125,6 +130,10 @@ ModelRunner::ModelRunner(ModelDescription description, ParameterModel& parameter
   for (const OutputMeasure& measure : description_.measures) {
     if (measure.interfaceType != InterfaceType::measureFile) continue;
     numbersNeeded_ = std::max(numbersNeeded_, static_cast<std::size_t>(measure.measurementNo));
+  }
+  if (std::error_code none; !description_.measureFile.empty()) {
+    const std::uintmax_t size = std::filesystem::file_size(trimTrailing(description_.measureFile), none);
+    if (!none) usualNumbers_ = size;
   }
   savedFiles_ = SavedFiles(description_.savedFiles, description_.baseFolder, description_.savedFolder);
   for (std::size_t i = 0; i < description_.measures.size() && description_.keepSimulatedValues; ++i) {
@@ -302,6 +311,7 @@ std::optional<EvaluationFailure> ModelRunner::prepareModelRun(std::span<const do
       updateResistanceNumbers(path);
     }
   }
+  files.started = runTimeClock() - readingSeconds_;
   shownRuns_.begin(slot, ToModelScale(parameters_.searchSpace(), set));
   launcher_.createProcesses(slot);
   return std::nullopt;
@@ -313,7 +323,37 @@ void ModelRunner::updateResistanceNumbers(const std::string& path) {
   fatalError(fmt::format("Error updating resistance numbers: {}", resistanceUpdateText(outcome)), path);
 }
 
-EvaluationResult ModelRunner::collect(int slot) {
+EvaluationResult ModelRunner::collect(int slot, std::function<void()> look) {
+  beginReading(slot, std::move(look));
+  const auto endReading = [this, began = runTimeClock()](ReadingWatch* watch) {
+    watch->end();
+    readingSeconds_ += runTimeClock() - began;
+  };
+  const std::unique_ptr<ReadingWatch, decltype(endReading)> reading(&series_.watch(), endReading);
+  try {
+    return read(slot);
+  } catch (const std::bad_alloc&) {
+    series_.releaseSimulationFiles();
+    return failedResult(makeFailure(Kind::resultsNotReadable,
+                                    "reading the files of the model run takes more memory than there is", slot));
+  }
+}
+
+/// A model that ended shortly before its limit is left some time for its results.
+void ModelRunner::beginReading(int slot, std::function<void()> look) {
+  constexpr double kLeastSeconds = 1.0;
+  double seconds = kLongestReading;
+  std::string limit = fmt::format("{:g} seconds", kLongestReading);
+  if (maxSeconds_ > 0.0) {
+    // Without the time in which the results of other slots were read, and this one had to wait.
+    const double used = runTimeClock() - readingSeconds_ - slots_.at(static_cast<std::size_t>(slot - 1)).started;
+    seconds = std::max(maxSeconds_ - used, kLeastSeconds);
+    limit = fmt::format("the model run had left of its {:g} seconds", maxSeconds_);
+  }
+  series_.watch().begin(seconds, std::move(limit), std::move(look));
+}
+
+EvaluationResult ModelRunner::read(int slot) {
   EvaluationResult result = judge(slot);
   for (std::string& line : sharedTargets_.takeChanged()) result.warnings.push_back(std::move(line));
   for (std::string& line : sharedTargets_.takeHardLinked(launcher_.getProcessFolder(slot), needs_.outputs)) {
@@ -462,7 +502,12 @@ std::optional<EvaluationFailure> ModelRunner::readMeasures(int slot, EvaluationR
   MeasureFile written;
   if (!files.measureFile.empty()) {
     std::string reason;
-    auto file = readMeasureFile(files.measureFile, numbersNeeded_, reason);
+    std::optional<MeasureFile> file;
+    if (const std::string tooLarge = faultOfSize(files.measureFile, usualNumbers_); !tooLarge.empty()) {
+      reason = fmt::format("{}: {}", files.measureFile, tooLarge);
+    } else {
+      file = readMeasureFile(files.measureFile, numbersNeeded_, reason, series_.watch());
+    }
     if (!file) return makeFailure(Kind::resultsNotReadable, std::move(reason), slot);
     written = std::move(*file);
   }

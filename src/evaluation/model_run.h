@@ -1,5 +1,7 @@
 #pragma once
 
+#include <cstdint>
+#include <functional>
 #include <optional>
 #include <span>
 #include <string>
@@ -69,8 +71,10 @@ class ModelRunner final {
   std::optional<EvaluationFailure> prepareModelRun(std::span<const double> set, int slot);
 
   /// The result of the slot's batch, which must have ended; its number is 0. Faults of the model run give a failed
-  /// result. Throws FatalError if the setup or the observations are at fault.
-  EvaluationResult collect(int slot);
+  /// result: files that cannot be read in what is left of the time of a model run among them. `look` is called about
+  /// ten times a second while files are read, and may throw to end it. Throws FatalError if the setup or the
+  /// observations are at fault.
+  EvaluationResult collect(int slot, std::function<void()> look = {});
 
   /// Keeps the output files of the slot's run, which belongs to evaluation `number`; adds warnings to `result` for
   /// files that could not be kept. To be called before the slot's next run.
@@ -110,6 +114,7 @@ class ModelRunner final {
     std::string measureFile;                   ///< empty when there is none
     bool isUsed = false;                       ///< a model has run in the folder
     bool isRenewed = false;                    ///< it was made anew, and no run has left it whole since
+    double started = 0.0;                      ///< when the model run was, by runTimeClock() - readingSeconds_
   };
 
   FolderNeeds folderNeeds(const LauncherSettings& settings) const;
@@ -122,7 +127,9 @@ class ModelRunner final {
   std::string belowBase(const std::string& file) const;
   std::string slotPath(const std::string& baseFile, int slot) const;
   void updateResistanceNumbers(const std::string& path);
+  EvaluationResult read(int slot);
   EvaluationResult judge(int slot);
+  void beginReading(int slot, std::function<void()> look);
   std::optional<EvaluationFailure> findBatchFailure(int slot) const;
   std::optional<EvaluationFailure> findMissingResults(int slot) const;
   /// Fills in the measures and simulated values and leaves the series open; returns a failure if the model's output
@@ -146,7 +153,10 @@ class ModelRunner final {
   std::vector<std::string> convertedTexts_;   ///< one per parameter file: that of a converted numeric-ID template
   std::vector<std::string> warnings_;
   SeriesTables series_;
-  std::size_t numbersNeeded_ = 0;  ///< in the output-measure file
+  std::size_t numbersNeeded_ = 0;    ///< in the output-measure file
+  std::uintmax_t usualNumbers_ = 0;  ///< size of that file as it was found at the start
+  double maxSeconds_ = 0.0;          ///< of a model run; 0: no limit
+  double readingSeconds_ = 0.0;      ///< that the results of model runs have taken so far
   SavedFiles savedFiles_;
   SharedTargets sharedTargets_;  ///< looked at again after the first model run
   std::vector<ObservedSeries> observedSeries_;

@@ -6,6 +6,7 @@
 
 #include "common/encoding.h"
 #include "common/files.h"
+#include "common/reading_watch.h"
 #include "common/text.h"
 
 namespace mirevo {
@@ -16,29 +17,39 @@ constexpr std::size_t kLongestQuoted = 60;
 /// The content of a file word by word.
 class Words final {
  public:
-  Words(std::string_view content, std::string_view separators) : lines_(splitLines(content)), separators_(separators) {}
+  /// `watch` may be null.
+  Words(std::string_view content, std::string_view separators, ReadingWatch* watch)
+      : rest_(content), separators_(separators), watch_(watch) {}
 
-  /// The next word; empty at the end.
+  /// The next word; empty at the end, and when the time is over.
   std::string_view next() {
-    while (lineNumber_ < lines_.size()) {
-      const std::string_view line = lines_[lineNumber_].substr(0, lines_[lineNumber_].find('#'));
-      begin_ = line.find_first_not_of(separators_, end_);
+    constexpr std::size_t kWordsPerLook = 65536;
+    if (watch_ != nullptr && ++count_ % kWordsPerLook == 0 && watch_->isOver()) return {};
+    while (true) {
+      begin_ = line_.find_first_not_of(separators_, end_);
       if (begin_ != std::string_view::npos) {
-        end_ = std::min(line.find_first_of(separators_, begin_), line.size());
-        return line.substr(begin_, end_ - begin_);
+        end_ = std::min(line_.find_first_of(separators_, begin_), line_.size());
+        return line_.substr(begin_, end_ - begin_);
       }
+      if (rest_.empty()) return {};
+      const std::size_t lineEnd = rest_.find('\n');
+      line_ = rest_.substr(0, lineEnd);
+      line_ = line_.substr(0, line_.find('#'));
+      rest_.remove_prefix(lineEnd == std::string_view::npos ? rest_.size() : lineEnd + 1);
       ++lineNumber_;
       end_ = 0;
     }
-    return {};
   }
   /// Where the last word is, "line:column".
-  std::string position() const { return fmt::format("{}:{}", lineNumber_ + 1, begin_ + 1); }
+  std::string position() const { return fmt::format("{}:{}", lineNumber_, begin_ + 1); }
 
  private:
-  std::vector<std::string_view> lines_;
+  std::string_view rest_;  ///< the lines after the current one
   std::string_view separators_;
-  std::size_t lineNumber_ = 0;  ///< 0-based
+  ReadingWatch* watch_;
+  std::string_view line_;
+  std::size_t count_ = 0;
+  std::size_t lineNumber_ = 0;
   std::size_t begin_ = 0;
   std::size_t end_ = 0;
 };
@@ -49,8 +60,8 @@ bool isDigit(char c) {
 
 /// The first number with a decimal comma, after its position, if commas between digits can all be meant as decimal ones
 /// and there are enough numbers then.
-std::string findDecimalComma(std::string_view content, std::size_t neededCount) {
-  Words words(content, " \t;\r");
+std::string findDecimalComma(std::string_view content, std::size_t neededCount, ReadingWatch* watch) {
+  Words words(content, " \t;\r", watch);
   std::string first;
   std::size_t count = 0;
   for (std::string_view word = words.next(); !word.empty(); word = words.next()) {
@@ -72,10 +83,10 @@ std::string findDecimalComma(std::string_view content, std::size_t neededCount) 
 }  // namespace
 
 std::optional<MeasureFile> parseMeasureFile(const std::string& sourceName, std::string_view content,
-                                            std::size_t neededCount, std::string& reason) {
+                                            std::size_t neededCount, std::string& reason, ReadingWatch* watch) {
   MeasureFile file;
   file.endsLine = endsLine(content);
-  Words words(content, " \t,;\r");
+  Words words(content, " \t,;\r", watch);
   for (std::string_view word = words.next(); !word.empty(); word = words.next()) {
     const std::optional<double> number = parseReal(word);
     if (!number) {
@@ -86,7 +97,12 @@ std::optional<MeasureFile> parseMeasureFile(const std::string& sourceName, std::
     }
     file.numbers.push_back(*number);
   }
-  if (const std::string ambiguous = findDecimalComma(content, neededCount); !ambiguous.empty()) {
+  const std::string ambiguous = findDecimalComma(content, neededCount, watch);
+  if (watch != nullptr && watch->isOver()) {
+    reason = fmt::format("{}: {}", sourceName, watch->reason());
+    return std::nullopt;
+  }
+  if (!ambiguous.empty()) {
     reason = fmt::format(
         "{}:{} may be one number with a decimal comma or two: a decimal point, or a blank behind a comma that "
         "separates, tells",
@@ -96,14 +112,15 @@ std::optional<MeasureFile> parseMeasureFile(const std::string& sourceName, std::
   return file;
 }
 
-std::optional<MeasureFile> readMeasureFile(const std::string& fileName, std::size_t neededCount, std::string& reason) {
+std::optional<MeasureFile> readMeasureFile(const std::string& fileName, std::size_t neededCount, std::string& reason,
+                                           ReadingWatch& watch) {
   std::string systemReason;
-  const std::optional<std::string> content = readTextFile(fileName, systemReason);
+  const std::optional<std::string> content = readTextFile(fileName, systemReason, watch);
   if (!content) {
     reason = fileName + ": " + systemReason;
     return std::nullopt;
   }
-  return parseMeasureFile(fileName, *content, neededCount, reason);
+  return parseMeasureFile(fileName, *content, neededCount, reason, &watch);
 }
 
 }  // namespace mirevo

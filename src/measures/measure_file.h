@@ -8,6 +8,8 @@
 
 namespace mirevo {
 
+class ReadingWatch;
+
 /// What a model wrote to an output-measure file.
 struct MeasureFile {
   std::vector<double> numbers;
@@ -17,10 +19,13 @@ struct MeasureFile {
 /// The numbers of an output-measure file in free format: separated by blanks, tabs, commas, semicolons or line ends,
 /// `#` comments to the end of the line. Empty, with line and cause in `reason`, when it cannot be read, when something
 /// in it is not a number, and when it could as well be meant with decimal commas: if each of its words is a number then
-/// (`0,153`), and they are at least `neededCount`, the number of the last that is used.
-std::optional<MeasureFile> readMeasureFile(const std::string& fileName, std::size_t neededCount, std::string& reason);
-/// The same for content in memory; `sourceName` is used in `reason`.
+/// (`0,153`), and they are at least `neededCount`, the number of the last that is used; and when the time of `watch` is
+/// over.
+std::optional<MeasureFile> readMeasureFile(const std::string& fileName, std::size_t neededCount, std::string& reason,
+                                           ReadingWatch& watch);
+/// The same for content in memory; `sourceName` is used in `reason`, `watch` may be null.
 std::optional<MeasureFile> parseMeasureFile(const std::string& sourceName, std::string_view content,
-                                            std::size_t neededCount, std::string& reason);
+                                            std::size_t neededCount, std::string& reason,
+                                            ReadingWatch* watch = nullptr);
 
 }  // namespace mirevo

@@ -2,14 +2,19 @@
 
 #include <algorithm>
 #include <cassert>
+#include <filesystem>
+#include <new>
+#include <system_error>
 #include <utility>
 
 #include <fmt/core.h>
 
 #include "common/fatal_error.h"
+#include "common/files.h"
 #include "common/text.h"
 #include "measures/measure_statistics.h"
 #include "measures/observed_series.h"
+#include "platform/series/series_reading.h"
 
 namespace mirevo {
 namespace {
@@ -41,21 +46,57 @@ std::optional<std::string> findUnusable(TimeSeriesObject& series, const std::str
   return std::nullopt;
 }
 
+constexpr std::string_view kTooMuchMemory = "reading it takes more memory than there is";
+
+/// Why the file of a model run cannot be opened, or its items in use not be read; empty, with `series`, when they can.
+std::optional<std::string> tryOpen(const std::string& path, std::uintmax_t usualSize, std::span<const int> items,
+                                   const std::shared_ptr<SeriesReading>& reading,
+                                   std::unique_ptr<TimeSeriesObject>& series) {
+  std::string reason;
+  series = createTimeSeriesObject(path, reason, reading);
+  if (series && isTextSeries(path)) reason = faultOfSize(path, usualSize);
+  if (!reason.empty()) return fmt::format("{}: {}", path, reason);
+  try {
+    series->willRead(items);
+    if (!series->open(path)) return series->lastError();
+    return findUnusable(*series, path, items);
+  } catch (const std::bad_alloc&) {
+    return fmt::format("{}: {}", path, kTooMuchMemory);
+  }
+}
+
+std::uintmax_t sizeOf(const std::string& path) {
+  std::error_code failed;
+  const std::uintmax_t size = std::filesystem::file_size(path, failed);
+  return failed ? 0 : size;
+}
+
 }  // namespace
 
-std::unique_ptr<TimeSeriesObject> openTimeSeries(const std::string& fileName, const std::string& setupLocation) {
+std::unique_ptr<TimeSeriesObject> openTimeSeries(const std::string& fileName, const std::string& setupLocation,
+                                                 std::shared_ptr<SeriesReading> reading, std::span<const int> items) {
   const std::string name(trimTrailing(fileName));
+  const std::string message = "Error opening TS object for file: " + name;
   std::string reason;
-  std::unique_ptr<TimeSeriesObject> series = createTimeSeriesObject(name, reason);
+  std::unique_ptr<TimeSeriesObject> series = createTimeSeriesObject(name, reason, std::move(reading));
   if (!series) fatalError("Error creating TS object for file: " + name, setupLocation + reason);
-  if (!series->open(name)) fatalError("Error opening TS object for file: " + name, setupLocation + series->lastError());
+  try {
+    series->willRead(items);
+    if (!series->open(name)) fatalError(message, setupLocation + series->lastError());
+  } catch (const std::bad_alloc&) {
+    series.reset();
+    fatalError(message, fmt::format("{}{}: {}", setupLocation, name, kTooMuchMemory));
+  }
   return series;
 }
+
+SeriesTables::SeriesTables() : reading_(std::make_shared<SeriesReading>()) {}
 
 SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> measures, const EvaluationPeriod& period) {
   SeriesTables tables;
   std::vector<std::string> observationLocations;  // of the measure that names a file first
   std::vector<std::string> simulationLocations;
+  std::vector<std::vector<int>> observationItems;
   for (const OutputMeasure& measure : measures) {
     if (measure.interfaceType != InterfaceType::timeSeries) {
       tables.observationIndex_.push_back(kNoSeries);
@@ -66,6 +107,8 @@ SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> mea
     if (tables.observationNames_.size() > observationLocations.size()) {
       observationLocations.push_back(measure.observation.fileLocation);
     }
+    observationItems.resize(tables.observationNames_.size());
+    observationItems[tables.observationIndex_.back()].push_back(measure.observation.itemNo);
     tables.simulationIndex_.push_back(indexOf(tables.simulationNames_, measure.simulation.fileName));
     if (tables.simulationNames_.size() > simulationLocations.size()) {
       simulationLocations.push_back(measure.simulation.fileLocation);
@@ -74,20 +117,23 @@ SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> mea
     tables.simulationItems_[tables.simulationIndex_.back()].push_back(measure.simulation.itemNo);
   }
   // In ascending order, so that the columns of a text file are found quickly one after another.
-  for (std::vector<int>& items : tables.simulationItems_) {
-    std::sort(items.begin(), items.end());
-    items.erase(std::unique(items.begin(), items.end()), items.end());
+  for (std::vector<std::vector<int>>* const table : {&tables.simulationItems_, &observationItems}) {
+    for (std::vector<int>& items : *table) {
+      std::sort(items.begin(), items.end());
+      items.erase(std::unique(items.begin(), items.end()), items.end());
+    }
   }
-  const auto open = [&tables](const std::string& name, const std::string& location) {
-    auto series = openTimeSeries(name, location);
+  const auto open = [&tables](const std::string& name, const std::string& location, std::span<const int> items) {
+    auto series = openTimeSeries(name, location, tables.reading_, items);
     if (const std::string doubt = series->doubt(); !doubt.empty()) tables.warnings_.push_back(location + doubt);
     return series;
   };
   for (std::size_t i = 0; i < observationLocations.size(); ++i) {
-    tables.observations_.push_back(open(tables.observationNames_[i], observationLocations[i]));
+    tables.observations_.push_back(open(tables.observationNames_[i], observationLocations[i], observationItems[i]));
   }
   for (std::size_t i = 0; i < simulationLocations.size(); ++i) {
-    tables.simulations_.push_back(open(tables.simulationNames_[i], simulationLocations[i]));
+    tables.simulations_.push_back(open(tables.simulationNames_[i], simulationLocations[i], tables.simulationItems_[i]));
+    tables.usualSizes_.push_back(sizeOf(tables.simulationNames_[i]));
   }
   tables.checkItems(measures, period);
   tables.releaseSimulationFiles();
@@ -114,31 +160,26 @@ void SeriesTables::checkItems(std::span<const OutputMeasure> measures, const Eva
 void SeriesTables::openSimulationFiles(std::span<const std::string> paths) {
   assert(paths.size() == simulationNames_.size());
   releaseSimulationFiles();
-  for (const std::string& path : paths) simulations_.push_back(openTimeSeries(path));
+  for (const std::string& path : paths) simulations_.push_back(openTimeSeries(path, {}, reading_));
 }
 
 std::optional<std::string> SeriesTables::tryOpenSimulationFiles(std::span<const std::string> paths) {
   assert(paths.size() == simulationNames_.size());
   releaseSimulationFiles();
   for (std::size_t i = 0; i < paths.size(); ++i) {
-    const std::string path(trimTrailing(paths[i]));
-    std::string reason;
-    std::unique_ptr<TimeSeriesObject> series = createTimeSeriesObject(path, reason);
-    std::optional<std::string> unusable;
-    if (!series) {
-      unusable = fmt::format("{}: {}", path, reason);
-    } else if (!series->open(path)) {
-      unusable = series->lastError();
-    } else {
-      unusable = findUnusable(*series, path, simulationItems_[i]);
-    }
-    if (unusable) {
+    std::unique_ptr<TimeSeriesObject> series;
+    if (auto unusable =
+            tryOpen(std::string(trimTrailing(paths[i])), usualSizes_[i], simulationItems_[i], reading_, series)) {
       releaseSimulationFiles();
       return unusable;
     }
     simulations_.push_back(std::move(series));
   }
   return std::nullopt;
+}
+
+ReadingWatch& SeriesTables::watch() {
+  return reading_->watch;
 }
 
 void SeriesTables::releaseSimulationFiles() {

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstdint>
 #include <memory>
 #include <optional>
 #include <span>
@@ -11,10 +12,14 @@
 
 namespace mirevo {
 
+class ReadingWatch;
+
 /// The opened time-series files of the run: every distinct observation file, open for the whole run, and every distinct
 /// simulation file, open only while the measures of one evaluation are computed.
 class SeriesTables final {
  public:
+  /// Without files.
+  SeriesTables();
   /// Opens every observation file and, as a check, every simulation file, which it releases again. Measures of
   /// interface type 1 have no series. Item numbers that a file does not have and observations that cannot be read are
   /// also found here, before the first model run. Throws FatalError with the fixed texts.
@@ -25,10 +30,13 @@ class SeriesTables final {
   void openSimulationFiles(std::span<const std::string> paths);
   /// The same for results that a model run may have left unusable. Returns one line for a person, with all files
   /// released, when a file cannot be opened or has no time step, or when an item in use cannot be read or has missing
-  /// values only; empty when the files are open. An item number that a file does not have is left to the measures,
-  /// which end the run.
+  /// values only, when the time of watch() is over, and when a file takes too much memory or is far larger than the one
+  /// that was found at the start; empty when the files are open. An item number that a file does not have is left to
+  /// the measures, which end the run.
   std::optional<std::string> tryOpenSimulationFiles(std::span<const std::string> paths);
   void releaseSimulationFiles();
+  /// Limits how long files are read.
+  ReadingWatch& watch();
 
   const std::vector<std::string>& observationFileNames() const { return observationNames_; }
   const std::vector<std::string>& simulationFileNames() const { return simulationNames_; }
@@ -56,13 +64,18 @@ class SeriesTables final {
   std::vector<std::size_t> simulationIndex_;
   std::vector<bool> needsPairs_;                   ///< one per measure
   std::vector<std::vector<int>> simulationItems_;  ///< one per simulation file: the item numbers in use
+  std::vector<std::uintmax_t> usualSizes_;         ///< one per simulation file: as it was found at the start
+  std::shared_ptr<SeriesReading> reading_;
   std::vector<std::unique_ptr<TimeSeriesObject>> observations_;
   std::vector<std::unique_ptr<TimeSeriesObject>> simulations_;
   std::vector<std::string> warnings_;
 };
 
-/// Creates and opens one file. Throws FatalError with "Error creating TS object for file: " or
-/// "Error opening TS object for file: " and the name; the detail holds the location, after `setupLocation`.
-std::unique_ptr<TimeSeriesObject> openTimeSeries(const std::string& fileName, const std::string& setupLocation = {});
+/// Creates and opens one file, whose `items` will be read; `reading` may be null. Throws FatalError with "Error
+/// creating TS object for file: " or "Error opening TS object for file: " and the name; the detail holds the location,
+/// after `setupLocation`.
+std::unique_ptr<TimeSeriesObject> openTimeSeries(const std::string& fileName, const std::string& setupLocation = {},
+                                                 std::shared_ptr<SeriesReading> reading = nullptr,
+                                                 std::span<const int> items = {});
 
 }  // namespace mirevo

@@ -1,11 +1,14 @@
 #include "common/files.h"
 
+#include <filesystem>
+#include <fstream>
 #include <sys/stat.h>
 #include <tuple>
 #include <unistd.h>
 
 #include <gtest/gtest.h>
 
+#include "common/file_copy.h"
 #include "temporary_folder.h"
 
 namespace mirevo {
@@ -53,6 +56,26 @@ TEST_F(Files, WhatCannotBeReplacedStaysAndNothingIsLeftBeside) {
   EXPECT_FALSE(replaceFile(folder_ / "a.txt", "new", reason_));
   EXPECT_EQ(reason_, "Is a directory");
   EXPECT_EQ(folder_.read("a.txt"), "old");
+}
+
+TEST_F(Files, HolesStayHolesInACopy) {
+  constexpr std::uintmax_t kSize = 40'000'000'000;
+  for (const bool hasData : {true, false}) {
+    folder_.write("sparse", hasData ? "begin" : "");
+    std::filesystem::resize_file(folder_ / "sparse", kSize);
+    if (hasData) std::fstream(folder_ / "sparse").seekp(kSize / 2) << "middle";
+    std::string reason;
+    ASSERT_TRUE(copyWhole(folder_ / "sparse", folder_ / "copy", reason)) << reason;
+    struct stat status {};
+    ASSERT_EQ(::stat((folder_ / "copy").c_str(), &status), 0);
+    EXPECT_EQ(status.st_size, kSize);
+    EXPECT_LT(status.st_blocks, 1000);
+    std::ifstream copy(folder_ / "copy");
+    std::string begin(5, ' ');
+    std::string middle(7, ' ');
+    copy.read(begin.data(), 5).seekg(kSize / 2).read(middle.data(), 7);
+    EXPECT_EQ(begin + middle, (hasData ? "beginmiddle" : std::string(11, '\0')) + std::string(1, '\0'));
+  }
 }
 
 TEST_F(Files, SaysTheSystemsReason) {

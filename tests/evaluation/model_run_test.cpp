@@ -1,5 +1,6 @@
 #include "evaluation/model_run.h"
 
+#include <filesystem>
 #include <tuple>
 #include <utility>
 
@@ -71,6 +72,36 @@ TEST_F(ModelRunTest, WhatAModelMayDoWrongIsAFailedEvaluationWithItsReason) {
     writes("simulated.csv", series(4.0));
     EXPECT_THAT(evaluate(2.0).measureValues, ElementsAre(3.0)) << name;
   }
+}
+
+TEST_F(ModelRunTest, ReadingResultsHoldsTheTimeLimitAndIsCancelled) {
+  const std::string files = MIREVO_SOURCE_DIR "/tests/platform/series/";
+  const auto leaves = [this, &files](const std::string& name) {
+    batch_.write = [from = files + name](const std::string& folder) {
+      std::filesystem::copy_file(from, folder + "/simulated.nc", std::filesystem::copy_options::overwrite_existing);
+    };
+  };
+  std::filesystem::copy_file(files + "sound.nc", folder_ / "base/simulated.nc");
+  description_.measures[0].simulation.fileName = folder_ / "base/simulated.nc";
+  settings_.maxSeconds = 0.5;
+  makeRunner(launcher_, 1);
+  leaves("endless.nc");
+  const EvaluationResult result = evaluate(2.0);
+  ASSERT_FALSE(result.ok());
+  EXPECT_EQ(result.failure->kind, Kind::resultsNotReadable);
+  EXPECT_THAT(result.failure->reason,
+              AnyOf(HasSubstr("simulated.nc: reading it took longer than the model run had left of its 0.5 seconds"),
+                    HasSubstr("simulated.nc: opening")));  // once the library is mended
+  leaves("sound.nc");
+  EXPECT_THAT(evaluate(2.0).measureValues, ElementsAre(2.0));
+
+  settings_.maxSeconds = 0.0;
+  leaves("endless.nc");
+  batch_.write = [this, write = batch_.write](const std::string& folder) {
+    write(folder);
+    observer_.cancelled = true;
+  };
+  EXPECT_THROW(EvaluationTest::evaluate(makeEvaluator(launcher_, 1, 9), {2.0}), RunCancelled);
 }
 
 TEST_F(ModelRunTest, MeasureFileValuesAreTakenByTheirNumber) {

@@ -289,22 +289,38 @@ void tryRemovedFiles(FaultReport& report) {
   }
 }
 
-/// The model's third run loses the end of what it wrote, as on a full disk, and ends well.
-void tryCutResults(FaultReport& report) {
-  for (const int bytes : {1, 2, 6}) {
+/// The model's third run damages what it wrote, or loses its end as on a full disk, and ends well.
+void tryDamagedResults(FaultReport& report) {
+  // what is done to the file `simulated`, its ending, what is told
+  constexpr std::tuple<const char*, const char*, const char*> kCases[] = {
+      {"truncate -s -1 $F", "csv", "simulated.csv has no end"},
+      {"truncate -s -2 $F", "csv", "simulated.csv has no end"},
+      {"truncate -s -6 $F", "csv", "simulated.csv has no end"},
+      {"truncate -s 40G $F", "csv", "MB are too many"},
+      {"head -c 2000000 /dev/zero | tr '\\000' , >$F", "csv", "expected at most 1000000 items"},
+      {"cp {}/endless.nc $F", "nc", "took longer than the model run had left of its 2 seconds"},
+      {"printf 'CDF\\001\\000\\000\\000\\000\\000\\000\\000\\012\\177\\377\\377\\377' >$F", "nc",
+       "it ends within its header"}};
+  const std::string files = MIREVO_SOURCE_DIR "/tests/platform/series";
+  for (const auto& [damage, ending, told] : kCases) {
     const TemporaryFolder outside;
-    FaultyRun run(RunSettings{.option = 2, .maxEvaluations = 6},
-                  fmt::format("echo >>{1}/count\n{0} \"$@\" || exit 1\n"
-                              "test -e {1}/armed && test `wc -l <{1}/count` -eq 3 && truncate -s -{2} simulated.csv\n"
-                              "exit 0",
-                              MIREVO_TEST_MODEL, outside.path(), bytes));
+    const std::string file = fmt::format("simulated.{}", ending);
+    FaultyRun run(
+        RunSettings{.option = 2, .maxEvaluations = 6},
+        fmt::format("F={3}\necho >>{1}/count\n{0} \"$@\" || exit 1\ncp {4}/sound.nc simulated.nc\n"
+                    "test -e {1}/armed && test `wc -l <{1}/count` -eq 3 && {2}\n"
+                    "exit 0",
+                    MIREVO_TEST_MODEL, outside.path(), fmt::format(fmt::runtime(damage), files), file, files));
+    fs::copy_file(files + "/sound.nc", run.folder() / "model/simulated.nc");
+    run.folder().editSetup("model/simulated.csv", "model/" + file);
+    run.folder().editSetup("NoSimultaneousSim = 1", "NoSimultaneousSim = 1\n    MaxSimulationTime = 2.0");
     run.makeReference();
     fs::remove(outside / "count");
     outside.write("armed", "");
     run.reset();
     const ProgramResult result = run.run({});
-    report.tried("results cut off", fmt::format("{} bytes", bytes),
-                 run.check(result, {.names = {"simulated.csv has no end"}, .mayFailEvaluation = true, .exitCode = 1}));
+    report.tried("results damaged", damage,
+                 run.check(result, {.names = {told}, .mayFailEvaluation = true, .exitCode = 1}));
   }
 }
 
@@ -364,7 +380,7 @@ void tryRealFaults(bool isLong, FaultReport& report) {
   tryForbiddenFiles(report);
   tryLimits(isLong, report);
   tryRemovedFiles(report);
-  tryCutResults(report);
+  tryDamagedResults(report);
   tryDamagedFolders(report);
   tryLeftProcesses(isLong, report);
   tryGuard(report);

@@ -10,6 +10,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "common/reading_watch.h"
 #include "matchers.h"
 #include "measures/observed_series.h"
 #include "platform/series/csv_time_series.h"
@@ -221,7 +222,8 @@ TEST(MeasureFile, FreeFormat) {
   EXPECT_EQ(reason, "m.txt:2:4: expected a number, found \"NaN\"");
   EXPECT_FALSE(parseMeasureFile("m.txt", "\xFF\xFE", 1, reason).has_value());
   EXPECT_THAT(reason, HasSubstr("; the file is UTF-16 text; save it as UTF-8"));
-  EXPECT_FALSE(readMeasureFile("no_such_folder/m.txt", 1, reason).has_value());
+  ReadingWatch watch;
+  EXPECT_FALSE(readMeasureFile("no_such_folder/m.txt", 1, reason, watch).has_value());
   EXPECT_EQ(reason, "no_such_folder/m.txt: No such file or directory");
 }
 

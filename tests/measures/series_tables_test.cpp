@@ -1,11 +1,13 @@
 #include "measures/series_tables.h"
 
+#include <filesystem>
 #include <tuple>
 #include <utility>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "common/reading_watch.h"
 #include "matchers.h"
 #include "refusal.h"
 #include "temporary_folder.h"
@@ -98,6 +100,17 @@ TEST_F(SeriesTablesTest, UnusableResultsOfARunAreAReasonAndNoError) {
   tables.releaseSimulationFiles();
   EXPECT_THAT(tables.tryOpenSimulationFiles(std::vector{(folder_ / "gone.csv")}).value(), HasSubstr("No such file"));
   EXPECT_THROW(tables.openSimulationFiles(std::vector{(folder_ / "gone.csv")}), FatalError);
+
+  const std::vector slot{folder_ / "slot.csv"};
+  tables.watch().begin(-1.0, "a moment");
+  EXPECT_EQ(tables.tryOpenSimulationFiles(slot), folder_ / "slot.csv" + ": reading it took longer than a moment");
+  tables.watch().end();
+  EXPECT_EQ(tables.tryOpenSimulationFiles(slot), std::nullopt);
+  std::filesystem::resize_file(folder_ / "slot.csv", 40'000'000'000);
+  EXPECT_EQ(tables.tryOpenSimulationFiles(slot),
+            folder_ / "slot.csv" +
+                ": its 40000.0 MB are too many: more than 4000.0 MB, and more than 100 times the 24 "
+                "bytes of the file in the model's folder");
 }
 
 }  // namespace

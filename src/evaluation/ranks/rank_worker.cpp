@@ -40,6 +40,12 @@ bool isExecuting(ModelRunner& runner) {
   return executing != 0;
 }
 
+bool isStopped(Job& job) {
+  const auto arrived = job.receive(0.0);
+  if (arrived && arrived->tag != static_cast<int>(RankMessage::stop)) refuse(*arrived);
+  return arrived.has_value();
+}
+
 /// Runs the model with one set; empty when the master sends stop in the meantime.
 std::optional<ResultMessage> runModel(Job& job, ModelRunner& runner, const SetMessage& message) {
   runner.setStandard(message.standard);
@@ -47,15 +53,21 @@ std::optional<ResultMessage> runModel(Job& job, ModelRunner& runner, const SetMe
     return ResultMessage{runner.failedResult(*failure), {}, {}};
   while (isExecuting(runner)) {
     runner.launcher().waitForChange(kBusyPollSeconds);
-    const auto arrived = job.receive(0.0);
-    if (!arrived) continue;
-    if (arrived->tag != static_cast<int>(RankMessage::stop)) refuse(*arrived);
+    if (!isStopped(job)) continue;
     runner.launcher().haltProcesses();
     return std::nullopt;
   }
-  ResultMessage answer{runner.collect(kSlot), runner.launcher().leftBehind(kSlot), {}};
-  runner.keepOutputFiles(kSlot, message.number, answer.result);
-  return answer;
+  try {
+    const auto look = [&job] {
+      if (isStopped(job)) throw RunCancelled();
+    };
+    ResultMessage answer{runner.collect(kSlot, look), runner.launcher().leftBehind(kSlot), {}};
+    runner.keepOutputFiles(kSlot, message.number, answer.result);
+    return answer;
+  } catch (const RunCancelled&) {
+    runner.launcher().haltProcesses();
+    return std::nullopt;
+  }
 }
 
 }  // namespace

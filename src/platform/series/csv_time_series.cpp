@@ -15,9 +15,13 @@
 #include "common/text.h"
 #include "common/utf8.h"
 #include "platform/series/csv_cells.h"
+#include "platform/series/series_reading.h"
 
 namespace mirevo {
 namespace {
+
+constexpr std::ptrdiff_t kLongestLine = std::ptrdiff_t{1} << 26;
+constexpr std::size_t kMostItems = 1'000'000;
 
 std::string_view viewOf(const char* begin, const char* end) {
   return {begin, static_cast<std::size_t>(end - begin)};
@@ -70,7 +74,8 @@ bool isHeadingOfHours(std::string_view heading) {
 
 bool CsvTimeSeries::open(const std::string& fileName) {
   std::string reason;
-  std::optional<std::string> content = readTextFile(fileName, reason);
+  std::optional<std::string> content =
+      reading_ ? readTextFile(fileName, reason, reading_->watch) : readTextFile(fileName, reason);
   if (!content) {
     clear();
     lastError_ = fileName + ": " + reason;
@@ -111,6 +116,7 @@ bool CsvTimeSeries::readPreamble(std::size_t& position) {
     const char* const begin = content_.data() + position;
     const char* const lineEnd = csv::endOfLine(begin, end);
     position = static_cast<std::size_t>(lineEnd - content_.data()) + (lineEnd != end ? 1 : 0);
+    if (lineEnd - begin > kLongestLine) return failOfLength(begin, lineEnd);
     const std::string_view line = viewOf(begin, csv::trimReturn(begin, lineEnd));
     const std::string_view text = trim(line);
     if (text.empty()) continue;
@@ -152,6 +158,7 @@ bool CsvTimeSeries::readHeader(std::string_view line) {
   while (cell != end) {
     const char* const begin = cell + 1;
     cell = csv::endOfCell(begin, end, separator_);
+    if (items_.size() == kMostItems) return fail(begin, fmt::format("at most {} items", kMostItems), "more");
     items_.push_back({std::string(csv::cellText(begin, cell))});
   }
   return true;
@@ -168,8 +175,10 @@ bool CsvTimeSeries::readRows(std::size_t position) {
   cells_.reserve(times_.capacity());
   csv::DateScanner dates;
   std::int64_t second = 0;
-  while (line < end) {
+  for (std::size_t row = 0; line < end; ++row) {
     const char* const next = csv::endOfLine(line, end);
+    if (next - line > kLongestLine) return failOfLength(line, next);
+    if (isOverAt(row)) return false;
     const char* const lineEnd = csv::trimReturn(line, next);
     if (!std::all_of(line, lineEnd, csv::isBlank) && !readRow(line, lineEnd, dates, second)) return false;
     line = next + 1;
@@ -215,6 +224,13 @@ std::string CsvTimeSeries::doubt() const {
                      quotedForMessage(itemName(1)), kOneColumn);
 }
 
+bool CsvTimeSeries::isOverAt(std::size_t row) {
+  constexpr std::size_t kRowsPerLook = 65536;
+  if (!reading_ || row % kRowsPerLook != 0 || !reading_->watch.isOver()) return false;
+  lastError_ = sourceName_ + ": " + reading_->watch.reason();
+  return true;
+}
+
 void CsvTimeSeries::moveToItem(int item) {
   if (item == cellsItem_) return;
   const char* const begin = content_.data();
@@ -237,8 +253,12 @@ bool CsvTimeSeries::readCells(std::size_t place, std::vector<Value>& values) {
   const auto endsCell = [&](const char* at) {
     return at == end || *at == separator_ || *at == '\n' || (*at == '\r' && (at + 1 == end || at[1] == '\n'));
   };
-  for (const std::size_t position : cells_) {
-    const char* const cell = begin + position;
+  for (std::size_t row = 0; row < cells_.size(); ++row) {
+    if (std::is_same_v<Value, float> && isOverAt(row)) {
+      values.clear();
+      return false;
+    }
+    const char* const cell = begin + cells_[row];
     Value value{};
     const auto [stop, error] = std::from_chars(cell, end, value);
     if (error == std::errc{} && endsCell(stop) && std::isfinite(value)) {
@@ -269,6 +289,10 @@ std::vector<double> CsvTimeSeries::readExactItem(std::size_t place) {
   std::vector<double> values;
   readCells(place, values);
   return values;
+}
+
+bool CsvTimeSeries::failOfLength(const char* line, const char* lineEnd) {
+  return fail(line, fmt::format("a line of at most {} bytes", kLongestLine), fmt::format("{}", lineEnd - line));
 }
 
 bool CsvTimeSeries::fail(const char* at, std::string_view expected, std::string_view found) {

@@ -2,8 +2,10 @@
 
 #include <cstdint>
 #include <limits>
+#include <memory>
 #include <string>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 #include "common/text.h"
@@ -20,6 +22,9 @@ class DateScanner;
 /// reads one column, so that unused columns cost nothing and may hold any text.
 class CsvTimeSeries final : public StoredTimeSeries {
  public:
+  /// With `reading` the reading ends when the time of its watch is over.
+  explicit CsvTimeSeries(std::shared_ptr<SeriesReading> reading = nullptr) : reading_(std::move(reading)) {}
+
   bool open(const std::string& fileName) override;
   /// open() for content in memory; `sourceName` is used in messages.
   bool parse(std::string sourceName, std::string content);
@@ -43,10 +48,14 @@ class CsvTimeSeries final : public StoredTimeSeries {
   bool readRows(std::size_t position);
   bool readRow(const char* line, const char* lineEnd, csv::DateScanner& dates, std::int64_t& second);
   void moveToItem(int item);
+  /// Whether the time is over, with lastError_ set then; looks at the clock once for many rows.
+  bool isOverAt(std::size_t row);
   /// Stores "file:line:column: expected ..., found ..." for the position `at` in the content as the last error; returns
   /// false.
   bool fail(const char* at, std::string_view expected, std::string_view found);
+  bool failOfLength(const char* line, const char* lineEnd);
 
+  std::shared_ptr<SeriesReading> reading_;
   std::string sourceName_;
   std::string content_;
   char separator_ = ',';

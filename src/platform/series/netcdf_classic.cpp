@@ -4,6 +4,7 @@
 #include <cmath>
 #include <cstdint>
 #include <fstream>
+#include <limits>
 #include <vector>
 
 #include <fmt/core.h>
@@ -21,7 +22,8 @@ class ClassicHeader final {
  public:
   explicit ClassicHeader(const std::string& fileName) : file_(fileName, std::ios::binary) {}
 
-  /// The least number of bytes that the file must have; empty if it cannot be determined.
+  /// The least number of bytes that the file must have: infinite if it has fewer than its header, whose counts the
+  /// library takes for granted; empty if it cannot be determined.
   std::optional<double> smallestSize() {
     if (number(3) != 0x434446) return std::nullopt;  // "CDF"
     const std::uint64_t version = number(1);
@@ -36,7 +38,8 @@ class ClassicHeader final {
     }
     skipAttributes();
     for (std::uint64_t left = listLength(kVariables); left > 0 && file_; --left) readVariable();
-    if (!file_ || isStreamed) return std::nullopt;
+    if (!file_) return std::numeric_limits<double>::infinity();
+    if (isStreamed) return std::nullopt;
     return endOfData(static_cast<double>(records));
   }
 
@@ -120,6 +123,7 @@ class ClassicHeader final {
 std::optional<std::string> findCutOff(const std::string& fileName) {
   const std::optional<double> expected = ClassicHeader(fileName).smallestSize();
   if (!expected) return std::nullopt;
+  if (std::isinf(*expected)) return "it ends within its header: it was not written to its end, or is damaged";
   std::ifstream file(fileName, std::ios::binary | std::ios::ate);
   const auto size = static_cast<double>(file.tellg());
   if (!file || size >= *expected) return std::nullopt;

@@ -18,8 +18,6 @@ namespace mirevo {
 namespace {
 
 constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
-constexpr std::size_t kMostSteps = std::size_t{1} << 27;  // a damaged header must not ask for all memory
-constexpr std::size_t kMostItems = 1'000'000;
 
 /// A variable's name, type and dimensions, with their lengths.
 struct Variable {
@@ -267,7 +265,9 @@ bool NetcdfTimeSeries::readTimes(int timeVariable) {
   if (!variable) return fail("the time variable cannot be read");
   const std::string where = "variable \"" + variable->name + "\"";
   const std::size_t count = variable->lengths[0];
-  if (count > kMostSteps) return fail(fmt::format("{}: expected at most {} steps, found {}", where, kMostSteps, count));
+  if (count > kMostNetcdfSteps) {
+    return fail(fmt::format("{}: expected at most {} steps, found {}", where, kMostNetcdfSteps, count));
+  }
   std::string reason;
   const std::optional<TimeUnits> units = parseTimeUnits(textAttribute(file_, timeVariable, "units"),
                                                         textAttribute(file_, timeVariable, "calendar"), reason);
@@ -278,6 +278,7 @@ bool NetcdfTimeSeries::readTimes(int timeVariable) {
   const auto earliest = static_cast<double>(secondNumber({0, 1, 1}));
   const auto latest = static_cast<double>(secondNumber({9999, 12, 31}));
   double first = 0.0;
+  times_.reserve(count);
   double firstFraction = 0.0;  // fraction of a second after startSecond_
   for (std::size_t step = 0; step < count; ++step) {
     const double seconds = unpack(stored[step]) * units->secondsPerUnit;
@@ -327,8 +328,9 @@ bool NetcdfTimeSeries::findItems(int timeVariable) {
     }
     // A grid over time is not a table of stations: it has no items.
     if (place.timePosition < 0 || longDimensions > 1) continue;
-    if (items_.size() + stations > kMostItems) {
-      return fail(fmt::format("expected at most {} items, found more at variable \"{}\"", kMostItems, variable->name));
+    if (items_.size() + stations > kMostNetcdfItems) {
+      return fail(
+          fmt::format("expected at most {} items, found more at variable \"{}\"", kMostNetcdfItems, variable->name));
     }
     for (place.station = 0; place.station < stations; ++place.station) {
       places_.push_back(place);
@@ -382,13 +384,21 @@ std::vector<double> NetcdfTimeSeries::readExactItem(std::size_t place) {
   return readValues(place).value_or(std::vector<double>(times_.size(), kNaN));
 }
 
-std::vector<double> NetcdfTimeSeries::storedUnits(std::size_t place, std::span<const double> values) {
+NetcdfUnit NetcdfTimeSeries::unitOf(std::size_t place) const {
   const int variable = places_[place].variable;
   nc_type type = NC_NAT;
   if (nc_inq_vartype(file_, variable, &type) != NC_NOERR || type == NC_DOUBLE) return {};
-  if (type == NC_FLOAT) return singleUnits(values);
-  const double scale = numberAttribute(file_, variable, "scale_factor").value_or(1.0);
-  return std::vector<double>(values.size(), std::abs(scale));
+  if (type == NC_FLOAT) return {NetcdfUnit::Kind::single};
+  return {NetcdfUnit::Kind::scaled, std::abs(numberAttribute(file_, variable, "scale_factor").value_or(1.0))};
+}
+
+std::vector<double> NetcdfTimeSeries::storedUnits(std::size_t place, std::span<const double> values) {
+  return unitOf(place).unitsOf(values);
+}
+
+std::vector<double> NetcdfUnit::unitsOf(std::span<const double> values) const {
+  if (kind == Kind::printed) return {};
+  return kind == Kind::single ? singleUnits(values) : std::vector<double>(values.size(), scale);
 }
 
 }  // namespace mirevo

@@ -1,11 +1,27 @@
 #pragma once
 
+#include <cstdint>
+#include <optional>
+#include <span>
 #include <string>
 #include <vector>
 
 #include "platform/series/stored_time_series.h"
 
 namespace mirevo {
+
+/// The unit of the numbers of an item, see TimeSeriesObject::units().
+struct NetcdfUnit {
+  enum class Kind : std::uint32_t { printed, single, scaled };
+  Kind kind = Kind::printed;
+  double scale = 1.0;  ///< of integers
+
+  /// For these values; empty for numbers that may have been printed.
+  std::vector<double> unitsOf(std::span<const double> values) const;
+};
+
+inline constexpr std::size_t kMostNetcdfSteps = std::size_t{1} << 27;
+inline constexpr std::size_t kMostNetcdfItems = 1'000'000;
 
 /// A CF NetCDF file, read through netCDF-C. Its time variable is the one over a single dimension whose `units` are
 /// "days|hours|minutes|seconds since DATE" (the one named like its dimension where there are several). Items are the
@@ -20,13 +36,14 @@ class NetcdfTimeSeries final : public StoredTimeSeries {
   /// NaN: every variable may have markers of its own (`_FillValue`, `missing_value`, the library's default fill value)
   /// and limits (`valid_min`, `valid_max`, `valid_range`); what they mark is replaced by NaN.
   std::optional<float> deleteValue() const override;
+  /// The values of an item, given by its 0-based index, unpacked; nothing, with the last error, when that fails.
+  std::optional<std::vector<double>> readValues(std::size_t place);
+  NetcdfUnit unitOf(std::size_t place) const;
 
  private:
   bool readItem(std::size_t place) override;
   std::vector<double> readExactItem(std::size_t place) override;
   std::vector<double> storedUnits(std::size_t place, std::span<const double> values) override;
-  /// The values of an item, unpacked; nothing, with the last error, when that fails.
-  std::optional<std::vector<double>> readValues(std::size_t place);
   const std::string& sourceName() const override { return fileName_; }
   /// Where the values of an item are in the file.
   struct Place {

@@ -4,31 +4,43 @@
 #include <filesystem>
 #include <functional>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 #include <fmt/format.h>
 
 #include "common/text.h"
 #include "platform/series/csv_time_series.h"
-#include "platform/series/netcdf_time_series.h"
+#include "platform/series/guarded_netcdf.h"
+#include "platform/series/series_reading.h"
 
 namespace mirevo {
 namespace {
 
 template <class Format>
-std::unique_ptr<TimeSeriesObject> make() {
-  return std::make_unique<Format>();
+std::unique_ptr<TimeSeriesObject> make(std::shared_ptr<SeriesReading> reading) {
+  return std::make_unique<Format>(std::move(reading));
 }
 
 /// The formats of series files. A further one needs a pair of files and a row here.
 struct SeriesFormat {
   std::string_view endings;  ///< of file names, in lower case, separated by blanks
-  std::unique_ptr<TimeSeriesObject> (*make)();
+  std::unique_ptr<TimeSeriesObject> (*make)(std::shared_ptr<SeriesReading>);
+  bool isText;
 };
 constexpr SeriesFormat kFormats[] = {
-    {".csv .txt .tsv", make<CsvTimeSeries>},
-    {".nc", make<NetcdfTimeSeries>},
+    {".csv .txt .tsv", make<CsvTimeSeries>, true},
+    {".nc", make<GuardedNetcdf>, false},
 };
+
+std::string endingOf(const std::string& fileName) {
+  return toLowerAscii(std::filesystem::path(trimTrailing(fileName)).extension().string());
+}
+
+bool hasEnding(const SeriesFormat& format, std::string_view ending) {
+  const std::vector<std::string_view> endings = splitAt(format.endings, ' ');
+  return std::find(endings.begin(), endings.end(), ending) != endings.end();
+}
 
 /// Index of the first step not earlier than `days`, with the tolerance kSameTimeDays; the number of steps when there is
 /// none. Widens its search from `hint` in doubling strides.
@@ -86,14 +98,20 @@ std::optional<Value> extractValue(std::span<const double> times, std::span<const
 
 }  // namespace
 
-std::unique_ptr<TimeSeriesObject> createTimeSeriesObject(const std::string& fileName, std::string& reason) {
-  const std::string ending = toLowerAscii(std::filesystem::path(trimTrailing(fileName)).extension().string());
+bool isTextSeries(const std::string& fileName) {
+  return std::any_of(std::begin(kFormats), std::end(kFormats), [ending = endingOf(fileName)](const auto& format) {
+    return format.isText && hasEnding(format, ending);
+  });
+}
+
+std::unique_ptr<TimeSeriesObject> createTimeSeriesObject(const std::string& fileName, std::string& reason,
+                                                         std::shared_ptr<SeriesReading> reading) {
+  if (!reading) reading = std::make_shared<SeriesReading>();
+  const std::string ending = endingOf(fileName);
   std::vector<std::string_view> known;
   for (const SeriesFormat& format : kFormats) {
-    for (const std::string_view each : splitAt(format.endings, ' ')) {
-      if (each == ending) return format.make();
-      known.push_back(each);
-    }
+    if (hasEnding(format, ending)) return format.make(std::move(reading));
+    for (const std::string_view each : splitAt(format.endings, ' ')) known.push_back(each);
   }
   reason = fmt::format("expected a time-series file name ending in {} or {}, found {}",
                        fmt::join(known.begin(), known.end() - 1, ", "), known.back(),

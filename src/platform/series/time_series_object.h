@@ -25,6 +25,8 @@ class TimeSeriesObject {
   /// "sim.csv:17:1: expected a time later than 2001-01-31 00:00".
   virtual bool open(const std::string& fileName) = 0;
   virtual const std::string& lastError() const = 0;
+  /// Before open(): these items will be read, as far as the file has them, which may save time.
+  virtual void willRead(std::span<const int> items) { static_cast<void>(items); }
 
   /// Date and time of the first step; empty if the file has no steps.
   virtual std::optional<DateRecord> startTime() const = 0;
@@ -52,9 +54,14 @@ class TimeSeriesObject {
   virtual std::vector<double> units(int item) = 0;
 };
 
+struct SeriesReading;
+
 /// An object of the class for the ending of the file name; nullptr for an unknown ending. `reason` then names the known
-/// ones.
-std::unique_ptr<TimeSeriesObject> createTimeSeriesObject(const std::string& fileName, std::string& reason);
+/// ones. Series of the same run share a `reading`; null: one of its own.
+std::unique_ptr<TimeSeriesObject> createTimeSeriesObject(const std::string& fileName, std::string& reason,
+                                                         std::shared_ptr<SeriesReading> reading = nullptr);
+/// Whether a series file of this name is text, all of which is read into memory.
+bool isTextSeries(const std::string& fileName);
 
 /// Half a millisecond, in days. Times that are closer are the same time: this is far above the rounding of days in 64
 /// bits over thousands of years and far below any time step.

@@ -104,7 +104,8 @@ const SettingSection<RunConfig>& slotsSection() {
              .range = kNonNegative,
              .refusal = "Error: Invalid maximum simulation time",
              .unit = "s",
-             .meaning = "Longest time of a model run; one that takes longer is ended and has failed. 0: no limit.",
+             .meaning = "Longest time of a model run, with the reading of its results; one that takes longer is ended "
+                        "and has failed. 0: no limit.",
              .bearsOnResults = kNotOfResults})}}};
   return section;
 }

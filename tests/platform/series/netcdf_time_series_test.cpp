@@ -2,7 +2,9 @@
 
 #include <cstdio>
 #include <filesystem>
+#include <fstream>
 #include <map>
+#include <memory>
 #include <numeric>
 #include <tuple>
 
@@ -12,6 +14,7 @@
 
 #include "common/calendar.h"
 #include "matchers.h"
+#include "platform/series/guarded_netcdf.h"
 #include "platform/series/netcdf_units.h"
 #include "platform/series/shown_values.h"
 
@@ -88,6 +91,31 @@ class NetcdfFile final {
   std::vector<std::tuple<int, std::vector<std::size_t>, std::vector<double>>> values_;  ///< variable, shape, values
 };
 
+/// That another process reads a file as this one does, bit for bit, and gives the same reason where it cannot.
+void expectSameGuarded(const std::string& path) {
+  NetcdfTimeSeries series;
+  const auto reading = std::make_shared<SeriesReading>();
+  for (const bool isAnnounced : {false, true}) {
+    GuardedNetcdf guarded(reading);
+    const std::vector<int> items = {5, 1, 99, 3};
+    if (isAnnounced) guarded.willRead(items);
+    ASSERT_EQ(guarded.open(path), series.open(path));
+    EXPECT_EQ(guarded.lastError(), series.lastError());
+    EXPECT_EQ(guarded.startTime(), series.startTime());
+    EXPECT_EQ(timesOf(guarded), timesOf(series));
+    ASSERT_EQ(guarded.itemCount(), series.itemCount());
+    for (int item = 0; item <= series.itemCount() + 1; ++item) {
+      EXPECT_EQ(guarded.itemName(item), series.itemName(item));
+      EXPECT_EQ(guarded.getData(item), series.getData(item));
+      EXPECT_EQ(guarded.lastError(), series.lastError());
+      EXPECT_THAT(guarded.values(item), ::testing::Pointwise(NanSensitiveFloatEq(), series.values(item)));
+      EXPECT_THAT(guarded.exactValues(item),
+                  ::testing::Pointwise(::testing::NanSensitiveDoubleEq(), series.exactValues(item)));
+      EXPECT_THAT(guarded.units(item), ::testing::Pointwise(::testing::NanSensitiveDoubleEq(), series.units(item)));
+    }
+  }
+}
+
 TEST(NetcdfTimeSeries, ReadsVariablesStationsAndPacking) {
   for (const int mode : {NC_CLASSIC_MODEL, NC_64BIT_OFFSET, NC_NETCDF4}) {
     NetcdfFile file("items.nc", mode);
@@ -125,6 +153,7 @@ TEST(NetcdfTimeSeries, ReadsVariablesStationsAndPacking) {
     EXPECT_EQ(series.units(2)[2], 30.0 * static_cast<double>(std::numeric_limits<float>::epsilon()));
     EXPECT_EQ(series.units(3)[0], 0.5);
     EXPECT_EQ(series.units(5)[1], 1.0);
+    expectSameGuarded(file.path());
   }
 }
 
@@ -218,6 +247,24 @@ TEST(NetcdfTimeSeries, AValueBeyondSinglePrecisionIsNamed) {
   EXPECT_FALSE(series.getData(1));
   EXPECT_THAT(series.lastError(), HasSubstr("variable \"flow\", step 2: expected a number of at most 3.4028235e38 in "
                                             "size, found -1e+39"));
+  expectSameGuarded(file.path());
+}
+
+// sound.nc with another byte 2072, from which the library never returns.
+TEST(GuardedNetcdf, ADamagedFileIsGivenUpAndTheNextOneIsRead) {
+  NetcdfFile counts("counts.nc");
+  std::ofstream(counts.path()) << std::string("CDF\1\0\0\0\0\0\0\0\12\x7F\xFF\xFF\xFF", 16) << std::string(300, '\0');
+  const auto reading = std::make_shared<SeriesReading>();
+  GuardedNetcdf series(reading);
+  reading->watch.begin(0.3, "0.3 seconds");
+  EXPECT_FALSE(series.open(MIREVO_SOURCE_DIR "/tests/platform/series/endless.nc"));
+  EXPECT_THAT(series.lastError(), AnyOf(HasSubstr("endless.nc: reading it took longer than 0.3 seconds"),
+                                        HasSubstr("endless.nc: opening")));  // once the library is mended
+  reading->watch.end();
+  EXPECT_FALSE(series.open(counts.path()));
+  EXPECT_THAT(series.lastError(), EndsWith("it ends within its header: it was not written to its end, or is damaged"));
+  EXPECT_TRUE(series.open(MIREVO_SOURCE_DIR "/tests/platform/series/sound.nc")) << series.lastError();
+  EXPECT_THAT(valuesOf(series, 1), ElementsAre(1.0F, 2.0F, 3.0F, 4.0F, 5.0F));
 }
 
 TEST(NetcdfTimeSeries, FilesThatAreNoneOrCutOffAreRefused) {
