@@ -21,9 +21,12 @@ void sendToMaster(Job& job, RankMessage tag, std::string content) {
   job.send(kMaster, static_cast<int>(tag), std::move(content));
 }
 
-Message await(Job& job) {
+Message await(Job& job, MasterWatch* watch) {
   while (true) {
-    if (auto message = job.receive(kIdleSeconds)) return std::move(*message);
+    if (auto message = job.receive(watch != nullptr ? MasterWatch::kLookSeconds : kIdleSeconds)) {
+      return std::move(*message);
+    }
+    if (watch != nullptr) watch->requireAnswerWithin(MasterWatch::kAnswerSeconds);
   }
 }
 
@@ -40,14 +43,17 @@ bool isExecuting(ModelRunner& runner) {
 }
 
 /// Runs the model with one set; empty when the master sends stop in the meantime.
-std::optional<ResultMessage> runModel(Job& job, ModelRunner& runner, const SetMessage& message) {
+std::optional<ResultMessage> runModel(Job& job, ModelRunner& runner, const SetMessage& message, MasterWatch& watch) {
   runner.setStandard(message.standard);
   if (auto failure = runner.prepareModelRun(message.set, kSlot))
     return ResultMessage{runner.failedResult(*failure), {}};
   while (isExecuting(runner)) {
     runner.launcher().waitForChange(kBusyPollSeconds);
     const auto arrived = job.receive(0.0);
-    if (!arrived) continue;
+    if (!arrived) {
+      watch.requireAnswerWithin(MasterWatch::kAnswerSeconds);
+      continue;
+    }
     if (arrived->tag != static_cast<int>(RankMessage::stop)) refuse(*arrived);
     runner.launcher().haltProcesses();
     return std::nullopt;
@@ -59,11 +65,11 @@ std::optional<ResultMessage> runModel(Job& job, ModelRunner& runner, const SetMe
 
 }  // namespace
 
-void runWorkerLoop(Job& job, ModelRunner& runner) {
+void runWorkerLoop(Job& job, ModelRunner& runner, MasterWatch& watch) {
   sendToMaster(job, RankMessage::ready, encode(ReadyMessage{hostName(), runner.launcher().getProcessFolder(kSlot)}));
   std::vector<std::string> warnings;  // on folders kept since the last result; sent with the next one
   while (true) {
-    const Message message = await(job);
+    const Message message = await(job, &watch);
     if (message.tag == static_cast<int>(RankMessage::stop)) return;
     if (message.tag == static_cast<int>(RankMessage::keepFolder)) {
       runner.keepFailedFolder(kSlot, decodeKeepFolder(message.content).number, warnings);
@@ -76,7 +82,7 @@ void runWorkerLoop(Job& job, ModelRunner& runner) {
           encode(GivenUpMessage{std::move(damage->what), std::move(damage->why), std::exchange(warnings, {})}));
       continue;
     }
-    auto result = runModel(job, runner, decodeSet(message.content));
+    auto result = runModel(job, runner, decodeSet(message.content), watch);
     if (!result) return;
     std::vector<std::string>& told = result->result.warnings;
     told.insert(told.begin(), warnings.begin(), warnings.end());
@@ -86,20 +92,24 @@ void runWorkerLoop(Job& job, ModelRunner& runner) {
 }
 
 std::optional<BeginMessage> awaitBegin(Job& job) {
-  const Message message = await(job);
+  const Message message = await(job, nullptr);
   if (message.tag == static_cast<int>(RankMessage::begin)) return decodeBegin(message.content);
   if (message.tag != static_cast<int>(RankMessage::stop)) refuse(message);
   return std::nullopt;
 }
 
-void sayFarewell(Job& job) {
+void sayFarewell(Job& job, MasterWatch* watch) {
   sendToMaster(job, RankMessage::farewell, {});
+  job.finalise([watch] {
+    if (watch != nullptr) watch->requireAnswerWithin(MasterWatch::kClosingSeconds);
+    return false;
+  });
 }
 
-void reportFailure(Job& job, const FailureMessage& failure) {
+void reportFailure(Job& job, const FailureMessage& failure, MasterWatch* watch) {
   sendToMaster(job, RankMessage::failure, encode(failure));
   while (true) {
-    const Message message = await(job);
+    const Message message = await(job, watch);
     if (message.tag == static_cast<int>(RankMessage::stop)) return;
   }
 }
