@@ -1,8 +1,11 @@
 #include "run/job_end.h"
 
+#include <algorithm>
+#include <set>
 #include <string>
 
 #include <fmt/core.h>
+#include <fmt/ranges.h>
 
 #include "common/fatal_error.h"
 #include "evaluation/ranks/rank_evaluator.h"
@@ -15,28 +18,65 @@ namespace {
 constexpr double kWorkerStopSeconds = 20.0;
 /// The same at the end of a task, when a worker that was not needed may still be copying a large base folder.
 constexpr double kWorkerPatienceSeconds = 600.0;
+/// The same once there is a kill file. It ends the run within five seconds, of which the launcher takes one or two.
+constexpr double kCancelledSeconds = 3.0;
+
+/// Whether the workers have had their time.
+class Patience {
+ public:
+  Patience(RunState& state, double seconds) : state_(state), end_(*state.workersStopped + seconds) {}
+
+  bool isOver() {
+    const double now = state_.clock();
+    if (!isCancelled_ && state_.progress.isCancelled()) {
+      isCancelled_ = true;
+      end_ = std::min(end_, (isFirst_ ? *state_.workersStopped : now) + kCancelledSeconds);
+    }
+    isFirst_ = false;
+    return now >= end_;
+  }
+
+ private:
+  RunState& state_;
+  double end_;
+  bool isCancelled_ = false;
+  bool isFirst_ = true;
+};
 
 }  // namespace
 
-void leaveJob(RunState& state, int exitCode, std::string_view ending) {
-  std::string reason = "a worker did not answer the request to stop";
+void stopWorkersOf(RunState& state) {
+  if (!state.job->hasWorkers() || state.workersStopped) return;
+  state.workersStopped = state.clock();
+  try {
+    stopWorkers(*state.job);
+  } catch (const FatalError&) {
+    // leaveJob() meets it, too
+  }
+}
+
+void leaveJob(RunState& state, int exitCode) {
+  if (!state.job->hasWorkers()) return;
+  stopWorkersOf(state);
   const auto warn = [&state, exitCode](const std::string& text) {
     if (exitCode != 0) return;  // the run has failed already; the first reason counts
     state.log.warning(text);
     showMessage("Warning: " + text, {}, MessageType::warning);
   };
+  Patience patience(state, exitCode == 0 ? kWorkerPatienceSeconds : kWorkerStopSeconds);
+  const auto isEnough = [&patience] { return patience.isOver(); };
+  std::string reason = "a worker that has stopped does not end";
   try {
-    if (stopWorkers(*state.job, exitCode == 0 ? kWorkerPatienceSeconds : kWorkerStopSeconds, warn)) {
-      state.job->finalise(kWorkerStopSeconds);
-      return;
+    const std::set<int> silent = awaitFarewells(*state.job, isEnough, warn);
+    if (silent.empty() && state.job->finalise(isEnough)) return;
+    if (!silent.empty()) {
+      reason = fmt::format("no answer to the request to stop from worker {}", fmt::join(silent, ", "));
     }
   } catch (const FatalError& error) {
     reason = error.message() + "\n" + error.detail();
   }
   showMessage(fmt::format("Warning: All processes of the {} job are aborted: {}", state.job->means(), reason), {},
               MessageType::warning);
-  state.progress.progressEnd(ending);
-  state.job->abort(exitCode);
 }
 
 }  // namespace mirevo

@@ -4,6 +4,7 @@
 #include <cstdlib>
 #include <fcntl.h>
 #include <filesystem>
+#include <memory>
 #include <string>
 #include <unistd.h>
 
@@ -100,11 +101,13 @@ void mirevoMain(const CommandLine& commandLine) {
     for (const std::string& sentence : commandLine.ignored()) showMessage(sentence, {}, MessageType::warning);
   }
   int exitCode = 1;
+  std::unique_ptr<Job> job;
   {
     RunDriver driver;
     exitCode = driver.run(setupFileName);
+    job = driver.takeJob();
   }
-  stopRun(exitCode);
+  stopRun(exitCode, job.get());
 }
 
 }  // namespace mirevo

@@ -483,6 +483,7 @@ void RunDriver::reportRun() {
 }
 
 void RunDriver::finish(const TaskOutcome& outcome) {
+  stopWorkersOf(state_);
   results_->close();
   logDifferences();
   results_->writeTables(outcome.tables, state_.log);
@@ -508,7 +509,7 @@ void RunDriver::finish(const TaskOutcome& outcome) {
     fatalError("Error: Unable to write to " + state_.log.path(), state_.log.writeError());
   }
   signalState.runLogDescriptor = -1;
-  leaveJob(state_, 0, kNormalTermination);
+  leaveJob(state_, 0);
   state_.log.close();
   if (!state_.log.writeError().empty()) {
     showMessage(fmt::format("Warning: The end of {} may be missing: {}", state_.log.path(), state_.log.writeError()));
@@ -591,6 +592,7 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
   }
   closeResultsOfEarlyEnd({RunStage::failed, std::string(message), explained}, statistics);
   if (launcher_) launcher_->haltProcesses();  // before the report, which takes time
+  stopWorkersOf(state_);
   reportRun();
   return endEarly(message);
 }
@@ -618,6 +620,7 @@ void RunDriver::closeLog() {
 }
 
 int RunDriver::endCancelled(std::string_view message) {
+  stopWorkersOf(state_);  // the log has the message already
   showMessage(message, {}, MessageType::information);
   const std::vector<std::string> statistics = keepStatistics();
   logDifferences();
@@ -638,7 +641,7 @@ int RunDriver::endEarly(std::string_view ending) {
   signalState.runLogDescriptor = -1;
   state_.log.close();
   if (launcher_) launcher_->haltProcesses();
-  leaveJob(state_, 1, ending);
+  leaveJob(state_, 1);
   endProgress(ending);
   tellOfWarnings();
   return 1;

@@ -5,6 +5,7 @@
 #include <span>
 #include <string>
 #include <string_view>
+#include <utility>
 
 #include "common/clock.h"
 #include "common/file_lock.h"
@@ -34,6 +35,8 @@ class RunDriver final {
 
   /// Runs the setup file; returns 0 after "Normal termination", else 1. Errors that end a run are caught only here.
   int run(const std::string& setupFileName);
+  /// The job, which is ended when everything else has been; none is left here.
+  std::unique_ptr<Job> takeJob() { return std::move(state_.job); }
 
  private:
   /// How the run ends.

@@ -1,6 +1,8 @@
 #pragma once
 
+#include <functional>
 #include <memory>
+#include <optional>
 #include <vector>
 
 #include "common/clock.h"
@@ -12,10 +14,12 @@ namespace mirevo {
 
 /// The state that all parts of a run share, owned by the run driver and passed to them.
 struct RunState {
+  std::function<double()> clock = runTimeClock;
   std::unique_ptr<Job> job = std::make_unique<SingleProcess>();
   int mpiRank = -1;  ///< -1 without MPI, 0 the master, above 0 a worker
   int mpiProcessCount = 1;
   bool mpiInUse = false;
+  std::optional<double> workersStopped;  ///< when they were told to
   RunLog log;
   ProgressReporter progress{runTimeClock};
   std::vector<double> objectiveValues;  ///< of the last model run, one per objective function

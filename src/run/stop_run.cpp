@@ -31,11 +31,12 @@ std::string openTerminationLog(const std::string& path) {
   return {};
 }
 
-void stopRun(int exitCode) {
+void stopRun(int exitCode, Job* job) {
   const EndingSignalsHeld held;  // until the end of the process: nothing may be written after the completion line
   if (const int unit = signalState.terminationLogUnit; unit > 0) {
     writeLineFromSignal(unit, exitCode != 0 ? "Abnormal completion" : "Successful completion");
   }
+  if (job != nullptr) job->end(exitCode);
   qmonExit(exitCode);
 }
 

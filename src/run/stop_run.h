@@ -2,6 +2,8 @@
 
 #include <string>
 
+#include "platform/jobs/job.h"
+
 namespace mirevo {
 
 /// Sets the descriptor to which stopRun() and the signal handlers write their completion line; none is written while it
@@ -12,7 +14,8 @@ void setTerminationLogUnit(int unit);
 /// one is set already. Returns a problem as one line; empty when all is well. The run goes on in any case.
 std::string openTerminationLog(const std::string& path);
 
-/// Writes the completion line to the termination log and ends the process with the exit code.
-[[noreturn]] void stopRun(int exitCode = 0);
+/// Writes the completion line to the termination log and ends the process with the exit code; of a job, if there is
+/// one, all processes that have not left it.
+[[noreturn]] void stopRun(int exitCode = 0, Job* job = nullptr);
 
 }  // namespace mirevo

@@ -6,7 +6,9 @@
 
 #include <fmt/core.h>
 
+#include "common/clock.h"
 #include "common/fatal_error.h"
+#include "common/run_files.h"
 #include "evaluation/ranks/rank_worker.h"
 #include "parameters/parameter_model.h"
 #include "platform/processes/posix_process_launcher.h"
@@ -19,13 +21,19 @@
 namespace mirevo {
 namespace {
 
-/// Time for the master, which waits for it, to receive the farewell.
-constexpr double kFarewellSeconds = 30.0;
-
 /// Works until the master sends stop; the model processes have ended when it returns.
-void work(Job& job) {
+void work(Job& job, std::optional<MasterWatch>& watch) {
   const auto begin = awaitBegin(job);
   if (!begin) return;
+  const SetupLocation setup = locateSetup(begin->setupFile);
+  watch.emplace(runFilePath(setup.folder + "/" + setup.name, run_files::kKill), runTimeClock, [&job] {
+    showMessage(
+        fmt::format("Warning: All processes of the {} job are aborted by worker {}: the master does not end the "
+                    "run, which the kill file cancels",
+                    job.means(), job.rank()),
+        {}, MessageType::warning);
+    job.abort(1);
+  });
   RunLog unread;  // discarded: the master's log has all of it
   const RunConfig config = readSetup(begin->setupFile, begin->text, unread, true);
   ParameterModel parameters(config.parameters, config.constraints);
@@ -35,18 +43,19 @@ void work(Job& job) {
   ModelDescription model = describeModel(config);
   model.runsAtOnce = job.processCount() - 1;  // they may share a disk
   ModelRunner runner(std::move(model), parameters, aggregator, launcher, launcherSettings(config, 1, job.rank()));
-  runWorkerLoop(job, runner);
+  runWorkerLoop(job, runner, *watch);
 }
 
-void workOrReport(Job& job) {
+void workOrReport(Job& job, std::optional<MasterWatch>& watch) {
+  const auto report = [&](const FailureMessage& failure) { reportFailure(job, failure, watch ? &*watch : nullptr); };
   try {
-    work(job);
+    work(job, watch);
   } catch (const FatalError& error) {
-    reportFailure(job, {error.message(), error.detail()});
+    report({error.message(), error.detail()});
   } catch (const std::bad_alloc&) {
-    reportFailure(job, {"Error: Unable to allocate memory", {}});
+    report({"Error: Unable to allocate memory", {}});
   } catch (const std::exception& error) {
-    reportFailure(job, {"Error: Unexpected failure", error.what()});
+    report({"Error: Unexpected failure", error.what()});
   }
 }
 
@@ -58,15 +67,14 @@ int runWorker(Job& job) {
   signalState.showsMessageBox = false;
   signalState.writesStandardOutput = false;
   try {
-    workOrReport(job);
-    sayFarewell(job);
-    job.finalise(kFarewellSeconds);
+    std::optional<MasterWatch> watch;
+    workOrReport(job, watch);
+    sayFarewell(job, watch ? &*watch : nullptr);
     return 0;
   } catch (const FatalError& error) {
     // The master cannot be reached any more.
     showMessage(fmt::format("Worker {}: {}\n{}", job.rank(), error.message(), error.detail()));
-    job.abort(1);
-    return 1;
+    return 1;  // and the job is aborted, as this process has not left it
   }
 }
 

@@ -35,8 +35,13 @@ class FakeJob final : public Job {
     arriving.pop_front();
     return message;
   }
-  void finalise(double) override { ++finalisations; }
+  bool finalise(const std::function<bool()>& isEnough) override {
+    ++finalisations;
+    while (!othersLeave && !isEnough()) receive(1.0);
+    return othersLeave;
+  }
   void abort(int exitCode) override { throw Aborted{exitCode}; }
+  void end(int) override {}
 
   void deliver(int rank, RankMessage tag, std::string content) {
     arriving.push_back({rank, static_cast<int>(tag), std::move(content)});
@@ -46,6 +51,7 @@ class FakeJob final : public Job {
   std::deque<Message> arriving;
   std::function<void(const Message&)> onSend;
   std::function<void(double)> onReceive;
+  bool othersLeave = true;
   int finalisations = 0;
 
  private:

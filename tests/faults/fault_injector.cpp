@@ -3,12 +3,14 @@
 // Environment:
 //
 //   FAULT_PROGRAM  the program file that it works in; the processes that this starts are left alone
+//   FAULT_RANK     of the processes of an MPI job, the one that it works in
 //   FAULT_FOLDER   calls to paths in this folder count; they are named relative to it. Starting a process is a call to
 //                  the path "(process)".
 //   FAULT_RECORD   the file to which every call is appended, a line "call<tab>path" each
 //   FAULT          "call<tab>path<tab>N<tab>errno<tab>how": the N-th such call, from 1, fails. How: "once"; "lasting":
-//                  so do all after it; "short": a write takes half of the bytes and the next one fails. A line
-//                  "failed" goes to the record when the call is met.
+//                  so do all after it; "short": a write takes half of the bytes and the next one fails;
+//                  "stuck": it does not return, and only SIGKILL ends the program. A line "failed" goes to the record
+//                  when the call is met.
 //   FAULT_KILL     the program is killed (SIGKILL) at its call of this number, from 1, before it is made
 //   FAULT_OLD      a kernel that has no pidfds and no close_range
 //   FAULT_CLOCK    that many seconds are taken from the time of day, once more with each look at it
@@ -51,6 +53,7 @@ struct Settings {
   int error = 0;
   bool isLasting = false;
   bool isShort = false;
+  bool isStuck = false;
   long killAt = 0;
   long clockStep = 0;
   bool isOld = false;
@@ -88,6 +91,7 @@ void readFault(const char* text) {
               &settings.error, how.data());
   settings.isLasting = std::string_view(how.data()) == "lasting";
   settings.isShort = std::string_view(how.data()) == "short";
+  settings.isStuck = std::string_view(how.data()) == "stuck";
 }
 
 __attribute__((constructor)) void initialise() {
@@ -95,6 +99,12 @@ __attribute__((constructor)) void initialise() {
   const ssize_t length = ::readlink("/proc/self/exe", self.data(), self.size() - 1);
   const char* program = std::getenv("FAULT_PROGRAM");
   if (length <= 0 || program == nullptr || std::string_view(self.data()) != program) return;
+  const char* rank = std::getenv("OMPI_COMM_WORLD_RANK");
+  const char* chosen = std::getenv("FAULT_RANK");
+  if (rank != nullptr && chosen != nullptr && std::string_view(rank) != chosen) {
+    ::unsetenv("LD_PRELOAD");
+    return;
+  }
   copyText(settings.folder, std::getenv("FAULT_FOLDER"));
   copyText(settings.record, std::getenv("FAULT_RECORD"));
   if (const char* fault = std::getenv("FAULT")) readFault(fault);
@@ -135,6 +145,12 @@ bool fails(const char* call, const char* path) {
   ++callsMet;
   if (callsMet < settings.number || (callsMet > settings.number && !settings.isLasting)) return false;
   appendToRecord("failed", relative);
+  if (settings.isStuck) {
+    sigset_t all;
+    ::sigfillset(&all);
+    ::sigprocmask(SIG_BLOCK, &all, nullptr);
+    while (true) ::pause();
+  }
   errno = settings.error;
   return true;
 }

@@ -4,6 +4,8 @@
 #include <set>
 #include <sys/stat.h>
 
+#include "integration/mpi_job.h"
+
 namespace mirevo::testing {
 namespace {
 
@@ -124,6 +126,15 @@ RunningProgram FaultyRun::start(const Environment& environment, const std::vecto
   std::vector<std::string> arguments(prefix.begin() + 1, prefix.end());
   arguments.insert(arguments.end(), {MIREVO_PROGRAM, setup()});
   return RunningProgram(arguments, marked, prefix.front().c_str());
+}
+
+ProgramResult FaultyRun::runJob(int processes, int rank, Environment environment) const {
+  if (processes <= 1) return run(environment);
+  environment.merge(jobEnvironment(0));  // the others have ended themselves when the master fails
+  environment["FAULT_RANK"] = std::to_string(rank);
+  std::vector<std::string> prefix = jobArguments(processes);
+  prefix.insert(prefix.begin(), "mpirun");
+  return run(environment, prefix);
 }
 
 std::map<std::string, std::string> FaultyRun::outputs() const {

@@ -57,6 +57,9 @@ class FaultyRun {
   }
   /// The same by way of another program, `prefix`, which takes the command to run as its further arguments.
   RunningProgram start(const Environment& environment, const std::vector<std::string>& prefix = {}) const;
+  /// The program as a job of that many processes; the faults of `environment` are those of one rank. One process: no
+  /// job.
+  ProgramResult runJob(int processes, int rank, Environment environment) const;
 
   /// What is wrong with a run that met a fault, besides what `program` says: whole rows, nothing lost, none left.
   std::vector<std::string> check(const ProgramResult& program, const Expectation& expected) const;

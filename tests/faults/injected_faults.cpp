@@ -5,6 +5,7 @@
 #include "common/files.h"
 #include "faults/fault_report.h"
 #include "faults/faulty_run.h"
+#include "integration/mpi_job.h"
 
 namespace mirevo::testing {
 namespace {
@@ -134,12 +135,34 @@ std::set<int> numbersToFail(int count, bool isLong) {
   return {1, 2, count / 2, count - 1, count};
 }
 
-std::vector<Fault> faultsOf(const std::map<Call, int>& counts, bool isLong, std::set<std::string>& triedInShort) {
+/// A run on which faults are tried, and the rank of a job that meets them.
+struct Case {
+  RunSettings settings;
+  int processes = 1;
+  int rank = 0;
+
+  bool isJob() const { return processes > 1; }
+  std::string name() const {
+    const std::string option =
+        fmt::format("{} {}", settings.restart != 0 ? "restart of option" : "option", settings.option);
+    return isJob() ? fmt::format("{}, rank {} of {}", option, rank, processes) : option;
+  }
+};
+
+/// In a job the short form tries the calls that a full disk and a lack of processes make fail.
+bool isTriedInShort(const Call& call, const Case& tried, std::set<std::string>& known) {
+  constexpr const char* kOfJobs[] = {"write", "copy", "clone"};
+  if (tried.isJob() && std::find(std::begin(kOfJobs), std::end(kOfJobs), call.first) == std::end(kOfJobs)) return false;
+  return known.insert(fmt::format("{}{}{}", tried.isJob() ? tried.rank : -1, call.first, kindOf(call.second))).second;
+}
+
+std::vector<Fault> faultsOf(const std::map<Call, int>& counts, bool isLong, const Case& tried,
+                            std::set<std::string>& triedInShort) {
   std::vector<Fault> faults;
   for (const auto& [call, count] : counts) {
     const auto errors = errorsOfCalls().find(call.first);
     if (errors == errorsOfCalls().end()) continue;
-    if (!isLong && !triedInShort.insert(call.first + kindOf(call.second)).second) continue;
+    if (!isLong && !isTriedInShort(call, tried, triedInShort)) continue;
     for (const auto& [error, how] : errors->second) {
       for (const int number : numbersToFail(count, isLong)) faults.push_back({call, number, error, how});
       if (!isLong) break;
@@ -189,39 +212,51 @@ void tryInjectedFaults(bool isLong, FaultReport& report) {
   const std::string slowFirst = "grep -q '^a = *1$' parameters.txt && sleep 0.1";
   const std::vector<std::string> scenarios = {"1, 1, 1", "2, 1, 1", "3, 1, 1", "9, 1, 1", "4, 1, 1",
                                               "5, 1, 1", "6, 1, 1", "2, 2, 1", "3, 2, 1", "4, 2, 1"};
-  const RunSettings cases[] = {
+  const Case cases[] = {
       // Two slots, of which one is slow at first, so that the result file is put in order at its end; one failed run.
-      {.option = 0, .scenarios = scenarios, .slots = 2, .modelArguments = "--fail-above 8"},
-      {.option = 2, .maxEvaluations = 6, .savedFile = "model/simulated.csv"},
-      {.option = 1},
-      {.option = 3, .maxEvaluations = 10},
-      {.option = 0, .scenarios = scenarios, .restart = 1, .modelArguments = "--fail-above 8"},
-      {.option = 2, .maxEvaluations = 6, .restart = 1, .savedFile = "model/simulated.csv"},
-      {.option = 3, .maxEvaluations = 10, .restart = 1}};
+      {{.option = 0, .scenarios = scenarios, .slots = 2, .modelArguments = "--fail-above 8"}},
+      {{.option = 2, .maxEvaluations = 6, .savedFile = "model/simulated.csv"}},
+      {{.option = 1}},
+      {{.option = 3, .maxEvaluations = 10}},
+      {{.option = 0, .scenarios = scenarios, .restart = 1, .modelArguments = "--fail-above 8"}},
+      {{.option = 2, .maxEvaluations = 6, .restart = 1, .savedFile = "model/simulated.csv"}},
+      {{.option = 3, .maxEvaluations = 10, .restart = 1}},
+      {{.option = 2, .maxEvaluations = 6, .savedFile = "model/simulated.csv"}, 3, 0},
+      {{.option = 2, .maxEvaluations = 6, .savedFile = "model/simulated.csv"}, 2, 1}};
   std::set<std::string> triedInShort;
-  for (const RunSettings& setting : cases) {
+  for (const Case& tried : cases) {
+    const RunSettings& setting = tried.settings;
     const bool isRestart = setting.restart != 0;
-    FaultyRun run(setting, setting.slots > 1 ? slowFirst : "");
-    const TemporaryFolder records;
-    if (!run.makeReference(run.injection({{"FAULT_RECORD", records / "calls"}}))) {
-      report.tried("undisturbed run", fmt::format("option {}", setting.option), {"fails"});
+    if (tried.isJob() && !mpirunIsInstalled()) {
+      report.skipped(tried.name(), "mpirun is not installed");
       continue;
     }
-    report.tried("flushed before renamed", fmt::format("option {}", setting.option),
-                 unflushedReplacements(records.read("calls")));
+    FaultyRun run(setting, setting.slots > 1 ? slowFirst : "");
+    const TemporaryFolder records;
+    const FaultyRun::Environment recording = run.injection({{"FAULT_RECORD", records / "calls"}});
+    if (!run.makeReference(tried.isJob() ? FaultyRun::Environment{} : recording)) {
+      report.tried("undisturbed run", tried.name(), {"fails"});
+      continue;
+    }
+    if (tried.isJob()) {
+      run.reset();
+      run.runJob(tried.processes, tried.rank, recording);
+      report.tried("undisturbed job", tried.name(), run.checkOutputs());
+    } else {
+      report.tried("flushed before renamed", tried.name(), unflushedReplacements(records.read("calls")));
+    }
     if (isRestart) leaveInterrupted(run, records);
-    for (const Fault& fault : faultsOf(countCalls(records.read("calls")), isLong, triedInShort)) {
+    for (const Fault& fault : faultsOf(countCalls(records.read("calls")), isLong, tried, triedInShort)) {
       run.reset();
       std::filesystem::remove(records / "trial");
-      const ProgramResult result =
-          run.run(run.injection({{"FAULT", fault.text()}, {"FAULT_RECORD", records / "trial"}}));
+      const ProgramResult result = run.runJob(
+          tried.processes, tried.rank, run.injection({{"FAULT", fault.text()}, {"FAULT_RECORD", records / "trial"}}));
       if (records.read("trial").find("failed\t") == std::string::npos) continue;  // another slot took that run
       const std::vector<std::string> problems = run.check(result, expectationOf(fault, run));
-      report.tried(
-          kindOf(fault.call.second),
-          fmt::format("{} {}: {} {}, call {} ({}): {}", isRestart ? "restart of option" : "option", setting.option,
-                      fault.call.first, fault.call.second, fault.number, fault.how, std::strerror(fault.error)),
-          problems, run.checkNextRun());
+      report.tried((tried.isJob() ? "under MPI: " : "") + kindOf(fault.call.second),
+                   fmt::format("{}: {} {}, call {} ({}): {}", tried.name(), fault.call.first, fault.call.second,
+                               fault.number, fault.how, std::strerror(fault.error)),
+                   problems, run.checkNextRun());
     }
   }
 }

@@ -5,6 +5,7 @@
 
 #include "faults/fault_report.h"
 #include "faults/faulty_run.h"
+#include "integration/mpi_job.h"
 
 namespace mirevo::testing {
 namespace {
@@ -38,12 +39,14 @@ void pauseMilliseconds(int milliseconds) {
 }
 
 /// Killed before a system call on its files that is drawn at random; where runs restart the next one goes on from
-/// there, and is itself killed every second time.
-void tryKills(const RunSettings& settings, int count, FaultReport& report) {
+/// there, and is itself killed every second time. In a job it is one of its ranks, and mpirun ends the others.
+void tryKills(const RunSettings& settings, int count, FaultReport& report, int processes = 1, int rank = 0) {
   FaultyRun run(settings);
   const bool restarts = settings.restart != 0;
   const TemporaryFolder records;
-  run.makeReference(run.injection({{"FAULT_RECORD", records / "calls"}}));
+  run.makeReference();
+  run.reset();
+  run.runJob(processes, rank, run.injection({{"FAULT_RECORD", records / "calls"}}));
   const std::string calls = records.read("calls");
   std::mt19937 generator(static_cast<unsigned>(settings.option));
   const auto callCount = static_cast<unsigned long>(std::count(calls.begin(), calls.end(), '\n'));
@@ -51,15 +54,19 @@ void tryKills(const RunSettings& settings, int count, FaultReport& report) {
     const unsigned long moment = 1 + generator() % callCount;
     const auto environment = run.injection({{"FAULT_KILL", std::to_string(moment)}});
     run.reset();
-    const ProgramResult result = run.run(environment);
-    if (result.signal != SIGKILL) continue;  // with several slots the number of calls is not always the same
+    const ProgramResult result = run.runJob(processes, rank, environment);
+    const bool wasKilled = result.signal == SIGKILL || result.exitCode == 128 + SIGKILL;
+    if (!wasKilled) continue;  // with several slots or ranks the number of calls is not always the same
     auto problems = run.checkProcesses();
-    if (restarts && i % 2 == 1) run.run(environment);
+    if (restarts && i % 2 == 1) run.runJob(processes, rank, environment);
     for (const auto& more : {run.checkProcesses(), run.checkRows({}), run.checkNextRun()}) {
       problems.insert(problems.end(), more.begin(), more.end());
     }
-    report.tried(restarts ? "killed and restarted" : "killed",
-                 fmt::format("{}, before call {} of {}", nameOf(settings), moment, callCount), problems);
+    const std::string kind = restarts ? "killed and restarted" : "killed";
+    report.tried(
+        processes > 1 ? "under MPI: " + kind : kind,
+        fmt::format("{}, rank {} of {}, before call {} of {}", nameOf(settings), rank, processes, moment, callCount),
+        problems);
   }
 }
 
@@ -219,6 +226,9 @@ void tryInterruptions(bool isLong, FaultReport& report) {
   }
   for (const RunSettings& settings : isLong ? std::span(kRuns) : std::span(kRuns).subspan(4, 1)) {
     tryDamages(restarting(settings), isLong, report);
+  }
+  for (const int rank : {0, 1}) {
+    if (mpirunIsInstalled()) tryKills(restarting(kRuns[0]), isLong ? 50 : 1, report, 3, rank);
   }
   tryStops(isLong ? 40 : 3, report);
   tryClocks(report);

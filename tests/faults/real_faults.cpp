@@ -8,6 +8,7 @@
 
 #include "faults/fault_report.h"
 #include "faults/faulty_run.h"
+#include "integration/mpi_job.h"
 
 namespace mirevo::testing {
 namespace {
@@ -162,8 +163,10 @@ void tryFullDisk(bool isLong, FaultReport& report) {
     report.skipped("full disk", "no disk of its own can be mounted: " + disk.reason());
     return;
   }
-  for (const int option : {0, 1, 2, 3}) {
-    if (!isLong && option != 2) continue;
+  for (const auto& [option, processes] :
+       {std::pair(0, 1), std::pair(1, 1), std::pair(2, 1), std::pair(3, 1), std::pair(2, 3)}) {
+    const bool isJob = processes > 1;
+    if ((!isLong && option != 2) || (isJob && !mpirunIsInstalled())) continue;
     RunSettings settings{.option = option, .maxEvaluations = option == 3 ? 10 : 6, .savedFile = "model/simulated.csv"};
     if (option == 0) settings.scenarios = {"1, 1, 1", "2, 2, 1", "3, 1, 1"};
     ::setenv("TMPDIR", disk.path().c_str(), 1);
@@ -171,11 +174,12 @@ void tryFullDisk(bool isLong, FaultReport& report) {
     ::unsetenv("TMPDIR");
     run->makeReference();
     for (const bool isFiles : {false, true}) {
+      if (isJob && isFiles && !isLong) continue;
       int undisturbed = 0;
-      for (int room = 0; room < 200 && undisturbed < 2; room += isLong ? 1 : 7) {
+      for (int room = 0; room < 200 && undisturbed < 2; room += isLong ? 1 : isJob ? 27 : 7) {
         run->reset();
         if (!disk.leave(isFiles ? -1 : room, isFiles ? room : -1)) throw std::runtime_error(std::strerror(errno));
-        const ProgramResult result = run->run({});
+        const ProgramResult result = run->runJob(processes, 0, {});
         disk.leave(-1, -1);
         // The log is on the same disk; a model that cannot write says so in its own words.
         const auto problems = run->check(result, {.names = {"No space left on device", "cannot write"},
@@ -184,8 +188,9 @@ void tryFullDisk(bool isLong, FaultReport& report) {
                                                   .logMayLackMessage = result.exitCode == 1,
                                                   .resultFileFails = true});
         undisturbed = result.exitCode == 0 && run->checkOutputs().empty() ? undisturbed + 1 : 0;
-        report.tried("full disk", fmt::format("option {}, room for {} {}", option, room, isFiles ? "files" : "blocks"),
-                     problems, run->checkNextRun());
+        report.tried(isJob ? "under MPI: full disk" : "full disk",
+                     fmt::format("option {}, room for {} {}", option, room, isFiles ? "files" : "blocks"), problems,
+                     run->checkNextRun());
       }
     }
   }

@@ -175,24 +175,46 @@ TEST_F(Mpi, HoweverAJobIsEndedItLeavesNoProcess) {
                   "  exec {1} --sleep-ms 3600000 --ignore-term 1 --grandchild '{0}/grandchild.pid'\n"
                   "fi",
                   folder_.path(), MIREVO_TEST_MODEL));
-  enum class Way { killFile, terminatedLauncher, killedWorker };
-  for (const Way way : {Way::killFile, Way::terminatedLauncher, Way::killedWorker}) {
-    RunningProgram job = startJob(3, {folder_.writeSetup({.option = 0, .scenarios = scenarios(12)})}, 6);
+  struct Way {
+    const char* name;
+    int stoppedRank, killedRank;  // of 0 and 1; -1: none
+    bool outlivesRanks;
+    int launcherSignal;  // 0: the kill file
+    int exitCode;
+    std::vector<const char*> messages;
+  };
+  const char* const cancelled = "EM: Simulation cancelled";
+  const char* const terminated = "Termination request";
+  const Way ways[] = {
+      {"kill file", -1, -1, false, 0, 1, {cancelled}},
+      {"SIGTERM to mpirun", -1, -1, false, SIGTERM, 1, {terminated}},
+      {"killed worker", -1, 1, false, -1, 128 + SIGKILL, {terminated, "signal 9"}},
+      {"stopped worker", 1, -1, false, 0, 1, {cancelled, "no answer to the request to stop from worker"}},
+      {"lost worker", -1, 1, true, 0, 1, {cancelled, "no answer to the request to stop from worker"}},
+      {"stopped master", 0, -1, false, 0, 1, {"aborted by worker"}}};
+  for (const Way& way : ways) {
+    SCOPED_TRACE(way.name);
+    const bool endsBySignal = way.launcherSignal != 0 || way.stoppedRank == 0;
+    RunningProgram job = startJob(3, {folder_.writeSetup({.option = 0, .scenarios = scenarios(12)})},
+                                  endsBySignal ? 4 : 1, way.outlivesRanks);
     std::vector<int> processes;
     for (const char* name : pidFiles) processes.push_back(folder_.waitForProcess(name));
     // All sets but one have been evaluated by the other worker.
     EXPECT_TRUE(waitUntil([&] { return occurrences(log(), " completed: OK") == 11; })) << log();
-    if (way == Way::killFile) folder_.write("basin._kill_", "");
-    if (way == Way::terminatedLauncher) job.send(SIGTERM);
-    if (way == Way::killedWorker) ::kill(processes.front(), SIGKILL);
-    const ProgramResult result = job.wait();
+    if (way.stoppedRank >= 0) ::kill(way.stoppedRank == 0 ? folder_.runsProcess() : processes.front(), SIGSTOP);
+    if (way.killedRank >= 0) ::kill(processes.front(), SIGKILL);
+    if (way.launcherSignal > 0) job.send(way.launcherSignal);
+    if (way.launcherSignal == 0) folder_.write("basin._kill_", "");
+    const ProgramResult result = job.wait(60.0);  // five seconds on a machine that is not busy
     EXPECT_FALSE(result.timedOut);
-    EXPECT_NE(result.exitCode, 0);
-    const char* const message = way == Way::killFile ? "EM: Simulation cancelled" : "Termination request";
-    EXPECT_THAT(log(), HasSubstr(fmt::format("\n{}\n", message)));
-    EXPECT_THAT(folder_.read("basin.dat"), HasSubstr(fmt::format("# {}\n", message)));
+    EXPECT_EQ(result.exitCode, way.exitCode);
+    for (const char* message : way.messages) EXPECT_THAT(result.error, HasSubstr(message));
+    if (way.stoppedRank != 0) {
+      EXPECT_THAT(log(), HasSubstr(fmt::format("\n{}\n", way.messages.front())));
+      EXPECT_THAT(folder_.read("basin.dat"), HasSubstr(fmt::format("# {}\n", way.messages.front())));
+    }
+    EXPECT_THAT(folder_.read("basin_Termination.log"), EndsWith("Abnormal completion\n"));
     EXPECT_EQ(readDataTable(folder_.read("basin.dat")).rows.size(), 11U);
-    EXPECT_THAT(result.error, HasSubstr(way == Way::killedWorker ? "signal 9" : message));
     for (const int process : processes) EXPECT_TRUE(waitUntil([&] { return !isRunning(process); })) << process;
     for (const char* name : pidFiles) std::filesystem::remove(folder_ / name);
     std::filesystem::remove(folder_ / "first");

@@ -5,14 +5,13 @@
 
 #include <fmt/core.h>
 
-#include "common/clock.h"
 #include "common/fatal_error.h"
 
 namespace mirevo {
 namespace {
 
 /// Longest time between two checks for cancellation; a message ends the wait.
-constexpr double kMasterPollSeconds = 0.5;
+constexpr double kMasterPollSeconds = 0.25;
 
 void sendToWorkers(Job& job, RankMessage tag, const std::string& content) {
   for (int rank = 1; rank < job.processCount(); ++rank) job.send(rank, static_cast<int>(tag), content);
@@ -167,21 +166,28 @@ void beginWorkers(Job& job, const BeginMessage& message) {
   sendToWorkers(job, RankMessage::begin, encode(message));
 }
 
-bool stopWorkers(Job& job, double seconds, const std::function<void(const std::string&)>& warn) {
+void stopWorkers(Job& job) {
   sendToWorkers(job, RankMessage::stop, {});
-  const double deadline = runTimeClock() + seconds;
-  int farewells = 0;
-  while (farewells < job.processCount() - 1) {
-    const auto message = job.receive(deadline - runTimeClock());
-    if (!message) return false;
-    if (message->tag == static_cast<int>(RankMessage::farewell)) ++farewells;
+}
+
+std::set<int> awaitFarewells(Job& job, const std::function<bool()>& isEnough,
+                             const std::function<void(const std::string&)>& warn) {
+  std::set<int> silent;
+  for (int rank = 1; rank < job.processCount(); ++rank) silent.insert(rank);
+  while (!silent.empty()) {
+    const auto message = job.receive(kMasterPollSeconds);
+    if (!message) {
+      if (isEnough()) return silent;
+      continue;
+    }
+    if (message->tag == static_cast<int>(RankMessage::farewell)) silent.erase(message->rank);
     if (message->tag == static_cast<int>(RankMessage::failure)) {
       const FailureMessage failure = decodeFailure(message->content);
       warn(fmt::format("Worker {} met an error that no evaluation depended on: {}{}{}", message->rank, failure.message,
                        failure.detail.empty() ? "" : "\n", failure.detail));
     }
   }
-  return true;
+  return silent;
 }
 
 }  // namespace mirevo

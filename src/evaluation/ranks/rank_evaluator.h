@@ -2,6 +2,7 @@
 
 #include <functional>
 #include <optional>
+#include <set>
 #include <vector>
 
 #include "evaluation/evaluation_ledger.h"
@@ -65,9 +66,13 @@ class RankEvaluator final : public Evaluator {
 /// Sends `message` to every worker, in rank order. A job of one process has none.
 void beginWorkers(Job& job, const BeginMessage& message);
 
-/// Tells every worker, in rank order, to stop, and waits for their farewells. False when one has not answered within
-/// `seconds`. A worker may fail after the last result, while it still copies the base folder; `warn` is called for each
-/// such failure. Other messages are dropped.
-bool stopWorkers(Job& job, double seconds, const std::function<void(const std::string&)>& warn);
+/// Tells every worker, in rank order, to stop.
+void stopWorkers(Job& job);
+
+/// Waits for the farewells of all workers, at most until `isEnough`, which is called several times a second, and
+/// returns the ranks of those that have said none. A worker may fail after the last result, while it still copies the
+/// base folder; `warn` is called for each such failure. Other messages are dropped.
+std::set<int> awaitFarewells(Job& job, const std::function<bool()>& isEnough,
+                             const std::function<void(const std::string&)>& warn);
 
 }  // namespace mirevo

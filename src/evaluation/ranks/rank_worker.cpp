@@ -22,9 +22,12 @@ void sendToMaster(Job& job, RankMessage tag, std::string content) {
   job.send(kMaster, static_cast<int>(tag), std::move(content));
 }
 
-Message await(Job& job) {
+Message await(Job& job, MasterWatch* watch) {
   while (true) {
-    if (auto message = job.receive(kIdleSeconds)) return std::move(*message);
+    if (auto message = job.receive(watch != nullptr ? MasterWatch::kLookSeconds : kIdleSeconds)) {
+      return std::move(*message);
+    }
+    if (watch != nullptr) watch->requireAnswerWithin(MasterWatch::kAnswerSeconds);
   }
 }
 
@@ -40,26 +43,27 @@ bool isExecuting(ModelRunner& runner) {
   return executing != 0;
 }
 
-bool isStopped(Job& job) {
+bool isStopped(Job& job, MasterWatch& watch) {
   const auto arrived = job.receive(0.0);
+  if (!arrived) watch.requireAnswerWithin(MasterWatch::kAnswerSeconds);
   if (arrived && arrived->tag != static_cast<int>(RankMessage::stop)) refuse(*arrived);
   return arrived.has_value();
 }
 
 /// Runs the model with one set; empty when the master sends stop in the meantime.
-std::optional<ResultMessage> runModel(Job& job, ModelRunner& runner, const SetMessage& message) {
+std::optional<ResultMessage> runModel(Job& job, ModelRunner& runner, const SetMessage& message, MasterWatch& watch) {
   runner.setStandard(message.standard);
   if (auto failure = runner.prepareModelRun(message.set, kSlot))
     return ResultMessage{runner.failedResult(*failure), {}, {}};
   while (isExecuting(runner)) {
     runner.launcher().waitForChange(kBusyPollSeconds);
-    if (!isStopped(job)) continue;
+    if (!isStopped(job, watch)) continue;
     runner.launcher().haltProcesses();
     return std::nullopt;
   }
   try {
-    const auto look = [&job] {
-      if (isStopped(job)) throw RunCancelled();
+    const auto look = [&job, &watch] {
+      if (isStopped(job, watch)) throw RunCancelled();
     };
     ResultMessage answer{runner.collect(kSlot, look), runner.launcher().leftBehind(kSlot), {}};
     runner.keepOutputFiles(kSlot, message.number, answer.result);
@@ -72,11 +76,11 @@ std::optional<ResultMessage> runModel(Job& job, ModelRunner& runner, const SetMe
 
 }  // namespace
 
-void runWorkerLoop(Job& job, ModelRunner& runner) {
+void runWorkerLoop(Job& job, ModelRunner& runner, MasterWatch& watch) {
   sendToMaster(job, RankMessage::ready, encode(ReadyMessage{hostName(), runner.launcher().getProcessFolder(kSlot)}));
   std::vector<std::string> warnings;  // on folders kept since the last result; sent with the next one
   while (true) {
-    const Message message = await(job);
+    const Message message = await(job, &watch);
     if (message.tag == static_cast<int>(RankMessage::stop)) return;
     if (message.tag == static_cast<int>(RankMessage::keepFolder)) {
       std::vector<std::string> problems;
@@ -92,7 +96,7 @@ void runWorkerLoop(Job& job, ModelRunner& runner) {
           encode(GivenUpMessage{std::move(damage->what), std::move(damage->why), std::exchange(warnings, {})}));
       continue;
     }
-    auto result = runModel(job, runner, decodeSet(message.content));
+    auto result = runModel(job, runner, decodeSet(message.content), watch);
     if (!result) return;
     result->warnings = std::exchange(warnings, {});
     sendToMaster(job, RankMessage::result, encode(*result));
@@ -100,20 +104,24 @@ void runWorkerLoop(Job& job, ModelRunner& runner) {
 }
 
 std::optional<BeginMessage> awaitBegin(Job& job) {
-  const Message message = await(job);
+  const Message message = await(job, nullptr);
   if (message.tag == static_cast<int>(RankMessage::begin)) return decodeBegin(message.content);
   if (message.tag != static_cast<int>(RankMessage::stop)) refuse(message);
   return std::nullopt;
 }
 
-void sayFarewell(Job& job) {
+void sayFarewell(Job& job, MasterWatch* watch) {
   sendToMaster(job, RankMessage::farewell, {});
+  job.finalise([watch] {
+    if (watch != nullptr) watch->requireAnswerWithin(MasterWatch::kClosingSeconds);
+    return false;
+  });
 }
 
-void reportFailure(Job& job, const FailureMessage& failure) {
+void reportFailure(Job& job, const FailureMessage& failure, MasterWatch* watch) {
   sendToMaster(job, RankMessage::failure, encode(failure));
   while (true) {
-    const Message message = await(job);
+    const Message message = await(job, watch);
     if (message.tag == static_cast<int>(RankMessage::stop)) return;
   }
 }

@@ -3,6 +3,7 @@
 #include <optional>
 
 #include "evaluation/model_run.h"
+#include "evaluation/ranks/master_watch.h"
 #include "evaluation/ranks/rank_messages.h"
 #include "platform/jobs/job.h"
 
@@ -10,15 +11,15 @@ namespace mirevo {
 
 /// The loop of a worker: runs each set that the master sends, in slot 1, and sends back its result, until the master
 /// sends stop; a model that is still running is then ended. Throws FatalError as ModelRunner does.
-void runWorkerLoop(Job& job, ModelRunner& runner);
+void runWorkerLoop(Job& job, ModelRunner& runner, MasterWatch& watch);
 
 /// Waits for the master's begin message; empty when stop comes instead.
 std::optional<BeginMessage> awaitBegin(Job& job);
 
-/// Reports a fatal error to the master and waits for its stop message.
-void reportFailure(Job& job, const FailureMessage& failure);
+/// Reports a fatal error to the master and waits for its stop message. `watch`: null before the run has begun.
+void reportFailure(Job& job, const FailureMessage& failure, MasterWatch* watch);
 
-/// Sends the worker's last message: nothing of it is running any more.
-void sayFarewell(Job& job);
+/// Sends the worker's last message: nothing of it is running any more. Then leaves the job.
+void sayFarewell(Job& job, MasterWatch* watch);
 
 }  // namespace mirevo

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <functional>
 #include <memory>
 #include <optional>
 #include <string>
@@ -44,12 +45,17 @@ class Job {
   /// waits. Throws FatalError when the job's communication is broken.
   virtual std::optional<Message> receive(double seconds) = 0;
 
-  /// Leaves the job; every process of the job must do so. Throws FatalError when the messages sent last are not
-  /// received within `seconds`.
-  virtual void finalise(double seconds) = 0;
+  /// Leaves the job when every process of the job has come to do so and all messages are received. False, and still in
+  /// it, when `isEnough`, which is called many times a second, says that it has waited long enough. Throws FatalError
+  /// when the job's communication is broken.
+  virtual bool finalise(const std::function<bool()>& isEnough) = 0;
 
   /// Ends every process of the job at once, for when one of them does not answer. Does not return.
   virtual void abort(int exitCode) = 0;
+
+  /// The last call before the process ends with that exit code: aborts a job that it could not leave, and sees to it
+  /// that the exit code becomes the launcher's.
+  virtual void end(int exitCode) = 0;
 };
 
 /// Joins the job that a launcher has started; without one this process is a job of its own. Throws FatalError when a

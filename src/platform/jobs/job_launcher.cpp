@@ -40,6 +40,11 @@ std::optional<int> launchedProcessCount() {
   return firstNumber(kSizeVariables);
 }
 
+bool launcherKeepsJob() {
+  const char* value = std::getenv("OMPI_MCA_orte_enable_recovery");
+  return value != nullptr && (value == std::string_view("1") || value == std::string_view("true"));
+}
+
 void hideJobFromModels() {
   std::vector<std::string> names;
   for (char** variable = ::environ; *variable != nullptr; ++variable) {

@@ -10,6 +10,10 @@ int launcherRank();
 /// How many processes the launcher has started; empty if it does not say.
 std::optional<int> launchedProcessCount();
 
+/// Whether the launcher lets the job go on when processes of it are lost (`mpirun --enable-recovery`). It then ends no
+/// other process when one aborts the job, and its own exit code is 0 whatever theirs are.
+bool launcherKeepsJob();
+
 /// Removes the launcher's variables from the environment: a model that uses MPI itself would take itself for a process
 /// of this job.
 void hideJobFromModels();

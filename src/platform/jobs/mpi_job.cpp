@@ -2,8 +2,10 @@
 
 #include <algorithm>
 #include <array>
+#include <csignal>
 #include <cstdlib>
 #include <ctime>
+#include <functional>
 #include <list>
 #include <optional>
 #include <string>
@@ -31,6 +33,9 @@ constexpr double kSteepness = 1.0 / 16.0;  ///< of the nap's growth with the tim
 constexpr double kPlateau = 1e-3;          ///< of the nap, from 16 ms to 200 ms of waiting
 constexpr double kLateSteepness = 1.0 / 200.0;
 
+/// Time for the launcher to take note that this process aborts the job.
+constexpr unsigned kAbortSeconds = 2;
+
 double napLength(double waited) {
   const double length = std::min(waited * kSteepness, std::max(kPlateau, waited * kLateSteepness));
   return std::clamp(length, kShortestNap, kLongestNap);
@@ -57,23 +62,38 @@ void check(int code, std::string_view call) {
   fatalError(kCommunicationFailed, fmt::format("{}: {}", call, errorText(code)));
 }
 
-/// Messages on their way. A list, since MPI refers to contents and requests by address.
+bool isDone(MPI_Request& request) {
+  int done = 0;
+  check(MPI_Test(&request, &done, MPI_STATUS_IGNORE), "MPI_Test");
+  return done != 0;
+}
+
+/// Messages on their way. Lists, since MPI refers to contents and requests by address.
 struct Traffic {
   struct Send {
     std::string content;
     MPI_Request request = MPI_REQUEST_NULL;
   };
+  /// A message whose sender may be stopped half-way through it, so that waiting for its end could last for ever.
+  struct Arrival {
+    Message message;
+    MPI_Request request = MPI_REQUEST_NULL;
+    bool isWhole = false;
+  };
   std::list<Send> running;
+  std::list<Arrival> arriving;          ///< in the order of sending, for each sender
   double lastMessage = runTimeClock();  ///< sent or received
 
   /// Removes messages that have arrived.
   void complete() {
     for (auto send = running.begin(); send != running.end();) {
-      int done = 0;
-      check(MPI_Test(&send->request, &done, MPI_STATUS_IGNORE), "MPI_Test");
-      send = done != 0 ? running.erase(send) : std::next(send);
+      send = isDone(send->request) ? running.erase(send) : std::next(send);
     }
   }
+  /// Begins to receive what others have begun to send.
+  void accept();
+  /// The first message that is whole and has no earlier one of the same sender before it.
+  std::optional<Message> take();
 };
 
 class MpiJob final : public Job {
@@ -85,17 +105,35 @@ class MpiJob final : public Job {
   int processCount() const override { return processCount_; }
   void send(int rank, int tag, std::string content) override;
   std::optional<Message> receive(double seconds) override;
-  void finalise(double seconds) override;
+  bool finalise(const std::function<bool()>& isEnough) override;
   void abort(int exitCode) override;
+  void end(int exitCode) override;
 
  private:
   int rank_;
   int processCount_;
+  bool isKept_ = launcherKeepsJob();
+  MPI_Request leaving_ = MPI_REQUEST_NULL;
   Traffic traffic_;
 };
 
-// Traffic::complete() tests the request until it is done, which the checker does not see.
+// Requests are tested until they are done, which the checker does not see.
 // NOLINTBEGIN(clang-analyzer-optin.mpi.MPI-Checker)
+void Traffic::accept() {
+  while (true) {
+    int found = 0;
+    MPI_Message handle = MPI_MESSAGE_NULL;
+    MPI_Status status;
+    check(MPI_Improbe(MPI_ANY_SOURCE, MPI_ANY_TAG, MPI_COMM_WORLD, &found, &handle, &status), "MPI_Improbe");
+    if (found == 0) return;
+    int size = 0;
+    check(MPI_Get_count(&status, MPI_BYTE, &size), "MPI_Get_count");
+    Arrival& arrival = arriving.emplace_back();
+    arrival.message = {status.MPI_SOURCE, status.MPI_TAG, std::string(static_cast<std::size_t>(size), '\0')};
+    check(MPI_Imrecv(arrival.message.content.data(), size, MPI_BYTE, &handle, &arrival.request), "MPI_Imrecv");
+  }
+}
+
 void MpiJob::send(int rank, int tag, std::string content) {
   traffic_.complete();
   Traffic::Send& send = traffic_.running.emplace_back();
@@ -107,21 +145,26 @@ void MpiJob::send(int rank, int tag, std::string content) {
 }
 // NOLINTEND(clang-analyzer-optin.mpi.MPI-Checker)
 
+std::optional<Message> Traffic::take() {
+  std::vector<int> unfinished;  // senders
+  for (auto arrival = arriving.begin(); arrival != arriving.end(); ++arrival) {
+    if (!arrival->isWhole) arrival->isWhole = isDone(arrival->request);
+    const int rank = arrival->message.rank;
+    if (!arrival->isWhole) unfinished.push_back(rank);
+    if (std::find(unfinished.begin(), unfinished.end(), rank) != unfinished.end()) continue;
+    Message message = std::move(arrival->message);
+    arriving.erase(arrival);
+    return message;
+  }
+  return std::nullopt;
+}
+
 std::optional<Message> MpiJob::receive(double seconds) {
   const double start = runTimeClock();
   while (true) {
     traffic_.complete();
-    int arrived = 0;
-    MPI_Status status;
-    check(MPI_Iprobe(MPI_ANY_SOURCE, MPI_ANY_TAG, MPI_COMM_WORLD, &arrived, &status), "MPI_Iprobe");
-    if (arrived != 0) {
-      Message message{status.MPI_SOURCE, status.MPI_TAG, {}};
-      int size = 0;
-      check(MPI_Get_count(&status, MPI_BYTE, &size), "MPI_Get_count");
-      message.content.resize(static_cast<std::size_t>(size));
-      check(MPI_Recv(message.content.data(), size, MPI_BYTE, message.rank, message.tag, MPI_COMM_WORLD,
-                     MPI_STATUS_IGNORE),
-            "MPI_Recv");
+    traffic_.accept();
+    if (auto message = traffic_.take()) {
       traffic_.lastMessage = runTimeClock();
       return message;
     }
@@ -131,24 +174,36 @@ std::optional<Message> MpiJob::receive(double seconds) {
   }
 }
 
-void MpiJob::finalise(double seconds) {
-  if (!hasWorkers()) return;  // has been called before
+// MPI_Finalize waits for every process, and can wait for ever: they meet before it.
+// NOLINTBEGIN(clang-analyzer-optin.mpi.MPI-Checker)
+bool MpiJob::finalise(const std::function<bool()>& isEnough) {
+  if (!hasWorkers()) return true;  // has been called before
+  check(MPI_Ibarrier(MPI_COMM_WORLD, &leaving_), "MPI_Ibarrier");
   const double start = runTimeClock();
-  for (traffic_.complete(); !traffic_.running.empty(); traffic_.complete()) {
-    const double waited = secondsSince(start);
-    if (waited >= seconds) {
-      fatalError(kCommunicationFailed, fmt::format("a message was not taken within {} seconds", seconds));
-    }
-    nap(std::min(napLength(waited), seconds - waited));
+  for (bool haveAllCome = false; true; nap(napLength(secondsSince(start)))) {
+    traffic_.complete();
+    haveAllCome = haveAllCome || isDone(leaving_);
+    if (haveAllCome && traffic_.running.empty()) break;
+    if (isEnough()) return false;
   }
   check(MPI_Finalize(), "MPI_Finalize");
   processCount_ = 1;
   rank_ = -1;
+  return true;
 }
+// NOLINTEND(clang-analyzer-optin.mpi.MPI-Checker)
 
 void MpiJob::abort(int exitCode) {
+  if (isKept_) ::kill(::getppid(), SIGTERM);  // the launcher, for which MPI_Abort ends this process alone
+  ::signal(SIGALRM, SIG_DFL);
+  ::alarm(kAbortSeconds);
   if (hasWorkers()) MPI_Abort(MPI_COMM_WORLD, exitCode);
   ::_exit(exitCode);
+}
+
+void MpiJob::end(int exitCode) {
+  if (hasWorkers()) abort(exitCode);
+  if (isKept_ && exitCode != 0) ::kill(::getppid(), SIGTERM);  // which makes its exit code 1
 }
 
 }  // namespace
@@ -171,8 +226,10 @@ std::unique_ptr<Job> joinMpiJob() {
     code = MPI_Comm_size(MPI_COMM_WORLD, &count);
     if (code == MPI_SUCCESS) code = MPI_Comm_rank(MPI_COMM_WORLD, &rank);
   }
+  std::unique_ptr<MpiJob> job;
+  if (code == MPI_SUCCESS && count > 1) job = std::make_unique<MpiJob>(rank, count);
   hideJobFromModels();
-  if (code == MPI_SUCCESS && count > 1) return std::make_unique<MpiJob>(rank, count);
+  if (job) return job;
   if (code == MPI_SUCCESS) MPI_Finalize();
   if (!launched) return nullptr;
   fatalError("Error: The processes of the job cannot reach each other by MPI",

@@ -13,7 +13,9 @@ std::optional<Message> SingleProcess::receive(double) {
   return std::nullopt;
 }
 
-void SingleProcess::finalise(double) {}
+bool SingleProcess::finalise(const std::function<bool()>&) {
+  return true;
+}
 
 void SingleProcess::abort(int exitCode) {
   ::_exit(exitCode);

@@ -13,8 +13,9 @@ class SingleProcess final : public Job {
   /// Never called: there is nobody to send to.
   void send(int rank, int tag, std::string content) override;
   std::optional<Message> receive(double seconds) override;
-  void finalise(double seconds) override;
+  bool finalise(const std::function<bool()>& isEnough) override;
   void abort(int exitCode) override;
+  void end(int) override {}
 };
 
 }  // namespace mirevo

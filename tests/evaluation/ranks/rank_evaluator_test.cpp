@@ -160,13 +160,15 @@ TEST_F(RankEvaluatorTest, StoppingGoesInRankOrderAndEndsWithTheLastFarewell) {
   job_.deliver(1, RankMessage::farewell, {});
   std::vector<std::string> warnings;
   const auto warn = [&](const std::string& text) { warnings.push_back(text); };
-  EXPECT_TRUE(stopWorkers(job_, 5.0, warn));
+  const auto isEnough = [] { return true; };
+  stopWorkers(job_);
+  EXPECT_THAT(awaitFarewells(job_, isEnough, warn), IsEmpty());
   EXPECT_THAT(warnings, ElementsAre("Worker 2 met an error that no evaluation depended on: too late\nNo space left"));
   ASSERT_EQ(job_.sent.size(), 2U);
   EXPECT_EQ(job_.sent[0].rank, 1);
   EXPECT_EQ(job_.sent[1].tag, static_cast<int>(RankMessage::stop));
   job_.deliver(1, RankMessage::farewell, {});
-  EXPECT_FALSE(stopWorkers(job_, 5.0, warn));  // the other one says nothing
+  EXPECT_THAT(awaitFarewells(job_, isEnough, warn), ElementsAre(2));
 }
 
 TEST_F(RankEvaluatorTest, TheWorkerOfAnEarlyFailureIsToldToKeepItsFolder) {

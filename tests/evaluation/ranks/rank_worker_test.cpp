@@ -47,12 +47,14 @@ class RankWorkerTest : public EvaluationTest {
   FakeLauncher launcher_;
   FakeJob job_{3};
   std::deque<double> sets_;
+  double now_ = 0.0;
+  MasterWatch watch_{folder_ / "run._kill_", [this] { return now_; }, [this] { job_.abort(1); }};
   int keepAt_ = -1;  ///< the sets left when the folder of the last run is to be kept
 };
 
 TEST_F(RankWorkerTest, AnswersEachSetUntilItIsToldToStop) {
   sets_ = {2.0, 9.5, 2.0};
-  runWorkerLoop(job_, *runner_);
+  runWorkerLoop(job_, *runner_, watch_);
   ASSERT_THAT(sentTags(),
               ElementsAre(RankMessage::ready, RankMessage::result, RankMessage::result, RankMessage::result));
   EXPECT_EQ(decodeReady(job_.sent[0].content).processFolder, folder_ / "run_Process1");
@@ -69,7 +71,7 @@ TEST_F(RankWorkerTest, KeepsTheFolderOfItsLastRunWhereTheMasterSaysSo) {
   makeRunner(launcher_, 1);
   sets_ = {2.0, 3.0};
   keepAt_ = 1;
-  runWorkerLoop(job_, *runner_);
+  runWorkerLoop(job_, *runner_, watch_);
   EXPECT_THAT(folder_.read("run_Failed17/parameters.txt"), EndsWith(" 2\n"));
   EXPECT_THAT(sentTags(), ElementsAre(RankMessage::ready, RankMessage::result, RankMessage::result));
 }
@@ -88,7 +90,7 @@ TEST_F(RankWorkerTest, AWarningIsToldOnceWithTheNextResultThere) {
   makeRunner(launcher, 1);
   sets_ = {2.0, 2.0, 2.0, 2.0};
   keepAt_ = 2;
-  runWorkerLoop(job_, *runner_);
+  runWorkerLoop(job_, *runner_, watch_);
   ASSERT_EQ(job_.sent.size(), 5U);
   EXPECT_THAT(warningsOf(1), ElementsAre(HasSubstr("often.txt was not kept: the model run did not write it")));
   EXPECT_THAT(warningsOf(2), IsEmpty());
@@ -107,7 +109,7 @@ TEST_F(RankWorkerTest, AFolderThatIsDamagedAgainIsToldInPlaceOfAResult) {
   });
   makeRunner(launcher, 1);
   sets_ = {2.0, 2.0, 2.0};
-  runWorkerLoop(job_, *runner_);
+  runWorkerLoop(job_, *runner_, watch_);
   ASSERT_THAT(sentTags(),
               ElementsAre(RankMessage::ready, RankMessage::result, RankMessage::result, RankMessage::givenUp));
   EXPECT_THAT(workerWarningsOf(2), ElementsAre(HasSubstr("was made anew")));
@@ -119,11 +121,46 @@ TEST_F(RankWorkerTest, StopEndsAModelThatRuns) {
   job_.onReceive = [this](double) {
     if (launcher_.starts == 3 && launcher_.now > 25.0) job_.deliver(0, RankMessage::stop, {});
   };
-  runWorkerLoop(job_, *runner_);
+  runWorkerLoop(job_, *runner_, watch_);
   EXPECT_EQ(launcher_.halts, 1);
   EXPECT_EQ(launcher_.runningCount(), 0);
   EXPECT_LE(launcher_.now, 25.5);  // it listens often
   EXPECT_EQ(job_.sent.size(), 3U);
+}
+
+TEST_F(RankWorkerTest, AKillFileThatTheMasterDoesNotAnswerEndsTheJob) {
+  const std::string killFile = folder_.write("run._kill_", "left over");
+  watch_ = MasterWatch(
+      killFile, [this] { return now_; }, [this] { job_.abort(1); });
+  enum class Wait { forASet, forTheModel, forStop, forTheOthers };
+  for (const auto& [wait, seconds] : {std::pair(Wait::forASet, 3.0), std::pair(Wait::forTheModel, 3.0),
+                                      std::pair(Wait::forStop, 3.0), std::pair(Wait::forTheOthers, 60.0)}) {
+    SCOPED_TRACE(static_cast<int>(wait));
+    job_.sent.clear();
+    const double start = now_;
+    job_.onReceive = [&, wait = wait](double) {
+      now_ += 0.1;
+      if (now_ - start > 20.0 && folder_.read("run._kill_") != "the user's") folder_.write("run._kill_", "the user's");
+      if (wait == Wait::forTheModel && job_.sent.size() == 1 && job_.arriving.empty() && launcher_.starts < 3) {
+        launcher_.starts = 2;  // the one that does not end
+        job_.deliver(0, RankMessage::set, encode(SetMessage{1, {2.0}}));
+      }
+    };
+    job_.onSend = nullptr;
+    job_.othersLeave = false;
+    try {
+      if (wait == Wait::forStop) reportFailure(job_, {"why", {}}, &watch_);
+      if (wait == Wait::forTheOthers) sayFarewell(job_, &watch_);
+      if (wait < Wait::forStop) runWorkerLoop(job_, *runner_, watch_);
+      ADD_FAILURE() << "it went on";
+    } catch (const FakeJob::Aborted& aborted) {
+      EXPECT_EQ(aborted.exitCode, 1);
+    }
+    EXPECT_NEAR(now_ - start, 20.0 + seconds, 1.0);
+    std::filesystem::remove(killFile);
+    now_ += 1.0;
+    watch_.requireAnswerWithin(0.0);  // sees that it is gone
+  }
 }
 
 TEST(RankMessages, ContentThatWasCutOrHasMoreIsRefused) {
