@@ -32,6 +32,7 @@ void EvaluationLedger::replay(std::size_t place, EvaluationResult result) {
 void EvaluationLedger::store(std::size_t place, EvaluationResult result) {
   // Not needed any more; the batch keeps its results until it is complete.
   result.shownSeries = {};
+  if (observer_.readsSimulatedValues()) result.simulatedValues = std::vector<double>();  // {} would keep its memory
   const EvaluationResult& stored = results_[place] = std::move(result);
   isFinished_[place] = true;
   ++finishedCount_;

@@ -27,6 +27,9 @@ class EvaluationObserver {
     static_cast<void>(set);
     static_cast<void>(result);
   }
+  /// Whether what recordEvaluation() has written of the simulated values is read again when they are needed, so that
+  /// results need not hold them.
+  virtual bool readsSimulatedValues() const { return false; }
   /// An evaluation has finished, in order of arrival; `set` is on the search scale. Called before its result is used.
   virtual void evaluationFinished(std::span<const double> set, const EvaluationResult& result) = 0;
   /// An evaluation has its result from an earlier run instead of the model. It counts like any other.

@@ -95,7 +95,7 @@ struct EvaluationResult {
   std::vector<double> exactMeasures;
   /// If the task asks for them, the simulated values at the observation times of ModelRunner::observedSeries(), one
   /// series after another, NaN where the model has none; exact ones with their units, see appendSimulatedValues().
-  /// Empty for a failed evaluation.
+  /// Empty for a failed evaluation, and once it has been reported if EvaluationObserver::readsSimulatedValues().
   std::vector<double> simulatedValues;
   /// For an evaluation that may be shown as the initial or the best one, its simulated series, one per measure of
   /// ModelRunner::shownMeasures(). Empty for all others, and once the evaluation has been reported.

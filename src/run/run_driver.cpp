@@ -354,7 +354,10 @@ TaskContext RunDriver::taskContext() {
           parameterFields(*parameters_, widestPlaceholders(runner_->templates(), config_.parameters.size())),
           [this](std::span<const double> values) { return aggregator_->aggregate(values); },
           parameters_->feasibility(),
-          [this](std::string_view text) { warn(text); }};
+          [this](std::string_view text) { warn(text); },
+          [this](std::span<const int> numbers, std::size_t first, std::size_t count) {
+            return results_->simulatedValues()->columns(numbers, first, count);
+          }};
 }
 
 TaskOutcome RunDriver::runTask() {

@@ -71,7 +71,9 @@ void RunReporter::evaluationReplayed(std::span<const double> set, const Evaluati
   if (!result.shownSeries.empty()) {
     recordSeries(values, result);
   } else if (result.ok() && recorder_ != nullptr) {
-    recorder_->evaluationPassed(result, values, best());
+    EvaluationResult passed = result;
+    if (readsSimulatedValues()) passed.simulatedValues = simulatedValues_->valuesOf(result.number);
+    recorder_->evaluationPassed(passed, values, best());
   }
 }
 

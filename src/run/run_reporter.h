@@ -36,6 +36,7 @@ class RunReporter final : public EvaluationObserver {
   void message(std::string_view text) override;
   void warning(std::string_view text) override;
   void recordEvaluation(std::span<const double> set, const EvaluationResult& result) override;
+  bool readsSimulatedValues() const override { return simulatedValues_ != nullptr && simulatedValues_->isReadBack(); }
   void evaluationFinished(std::span<const double> set, const EvaluationResult& result) override;
   void evaluationReplayed(std::span<const double> set, const EvaluationResult& result) override;
   void runCompared(const ComparisonFindings& found) override;

@@ -49,6 +49,15 @@ TEST_F(LocalEvaluatorTest, OneSlotRunsOneSetAfterAnother) {
   EXPECT_LE(launcher.longestWait, 3.0);
 }
 
+TEST_F(LocalEvaluatorTest, SimulatedValuesThatAreReadAgainTakeNoMemory) {
+  description_.keepSimulatedValues = true;
+  FakeLauncher launcher([&](int, const std::string&) { return computes(1.0); });
+  LocalEvaluator& evaluator = makeEvaluator(launcher, 1, 100);
+  EXPECT_THAT(evaluate(evaluator, {2.0}).at(0).simulatedValues, testing::Each(2.0));
+  observer_.readsValues = true;
+  EXPECT_EQ(evaluate(evaluator, {2.0}).at(0).simulatedValues.capacity(), 0U);
+}
+
 TEST_F(LocalEvaluatorTest, EverySetsOutputIsSavedUnderItsNumberAndAFailedOnesIsNot) {
   description_.savedFiles = {folder_ / "base/simulated.csv"};
   description_.savedFolder = folder_ / "run_Saved";

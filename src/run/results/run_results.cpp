@@ -90,7 +90,8 @@ void RunResults::open(const RunConfig& config, std::span<const ObservedSeries> o
   if (config.keepsSimulatedValues() || config.usesExactMeasures()) {
     const SeriesPrecision precision = config.task->keptPrecision();
     simulatedValues_.emplace(files_.simulatedValues, simulatedValueCount(observed, precision), precision,
-                             config.usesExactMeasures() ? config.measures.size() : 0);
+                             config.usesExactMeasures() ? config.measures.size() : 0,
+                             config.task->readsSimulatedValues());
   }
   if (earlierRun_) {
     goOn(config, aggregator, log);

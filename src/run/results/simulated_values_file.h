@@ -1,8 +1,10 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <map>
 #include <set>
+#include <span>
 #include <string>
 #include <vector>
 
@@ -22,22 +24,31 @@ struct KeptValues {
 /// them: the result file does not hold them, and a restarted run needs those of the evaluations that it does not
 /// repeat. Binary, one record per evaluation: its number, the values, the measures, a checksum of all. Not meant for
 /// other programs: on a machine with another number format the file counts as damaged, and the evaluations are
-/// repeated.
+/// repeated. Of several records of an evaluation the last counts.
 class SimulatedValuesFile final {
  public:
-  /// `valueCount`: simulated values of one evaluation.
+  /// `valueCount`: simulated values of one evaluation. `isReadBack`: the task reads them with valuesOf() and columns(),
+  /// so that no one keeps them in memory.
   SimulatedValuesFile(std::string path, std::size_t valueCount, SeriesPrecision precision = SeriesPrecision::single,
-                      std::size_t exactMeasureCount = 0);
+                      std::size_t exactMeasureCount = 0, bool isReadBack = false);
 
   /// Creates the file, replacing an existing one. Throws FatalError.
   void create();
-  /// Continues the file of an interrupted run: keeps the records of the evaluations with these numbers, appends to them
-  /// from now on, and returns their values by number. Records that are cut off, damaged or of other evaluations are
-  /// dropped, and so are all of a file of another precision. Throws FatalError when the file cannot be written.
+  /// Continues the file of an interrupted run: appends to its records from now on, and returns what it has of the
+  /// evaluations with these numbers; the simulated values are left out if they are read back. Records that are damaged
+  /// or of other evaluations are passed over, one that is cut off is removed, and so are all of a file of another
+  /// precision. Throws FatalError when the file cannot be read or written.
   std::map<int, KeptValues> takeUp(const std::set<int>& numbers);
 
   /// Writes the values of a successful evaluation. Throws FatalError when that fails.
   void add(const EvaluationResult& result);
+
+  bool isReadBack() const { return isReadBack_; }
+  /// The simulated values of an evaluation that was added or taken up. Throws FatalError if they cannot be read.
+  std::vector<double> valuesOf(int number) const;
+  /// Of such evaluations the simulated values from index `first` on, `count` of each; those with the same index side
+  /// by side, in the order of `numbers`. Throws FatalError if they cannot be read.
+  std::vector<double> columns(std::span<const int> numbers, std::size_t first, std::size_t count) const;
   /// Throws FatalError if not everything written has reached the file.
   void close() { file_.close(); }
 
@@ -46,12 +57,19 @@ class SimulatedValuesFile final {
  private:
   std::string head() const;
   std::size_t recordedCount() const { return valueCount_ + exactMeasureCount_; }
+  std::size_t contentLength() const { return sizeof(std::int64_t) + recordedCount() * sizeof(double); }
+  std::size_t recordLength() const { return contentLength() + sizeof(std::uint64_t); }
+  void read(std::int64_t offset, char* bytes, std::size_t size) const;
+  void noteOffset(int number, std::int64_t offset);
+  std::int64_t offsetOf(int number) const;
 
   std::string path_;
   std::size_t valueCount_;
   SeriesPrecision precision_;
   std::size_t exactMeasureCount_;
+  bool isReadBack_;
   RecordFile file_;
+  std::vector<std::int64_t> offsets_;  ///< of the record of each evaluation, from No. 1 on; 0: none
 };
 
 }  // namespace mirevo

@@ -218,7 +218,7 @@ TEST(SimulatedValuesFile, KeepsWholeRecordsOfTheEvaluationsThatCount) {
     file.add(result);
   };
   const auto fileOf = [&](SeriesPrecision precision = SeriesPrecision::single) {
-    return SimulatedValuesFile(folder / "v.bin", 1, precision, 1);
+    return SimulatedValuesFile(folder / "v.bin", 1, precision, 1, true);
   };
   SimulatedValuesFile file = fileOf();
   file.create();
@@ -234,15 +234,23 @@ TEST(SimulatedValuesFile, KeepsWholeRecordsOfTheEvaluationsThatCount) {
     const std::size_t records = length < kHead ? 0 : (length - kHead) / kRecord;
     ASSERT_EQ(found.size(), std::min<std::size_t>(records, 2)) << length;
     for (const auto& [number, values] : found) {
-      EXPECT_THAT(values.simulatedValues, ElementsAre(0.1 * number));
+      EXPECT_THAT(values.simulatedValues, IsEmpty());
+      EXPECT_THAT(cut.valuesOf(number), ElementsAre(0.1 * number));
       EXPECT_THAT(values.exactMeasures, ElementsAre(-1.0 * number));
     }
     add(cut, 2);
-    EXPECT_EQ(folder.read("v.bin").size(), kHead + (found.size() + 1) * kRecord);
+    EXPECT_EQ(folder.read("v.bin").size(), kHead + (records + 1) * kRecord);
+    if (records == 0) continue;
+    EXPECT_THAT(cut.columns(std::vector{2, 3}, 0, 1), ElementsAre(0.2, 0.1 * 3));
   }
   std::string damaged = whole;
   damaged[kHead + kRecord + 10] ^= 1;
-  folder.write("v.bin", damaged);
+  folder.write("v.bin", whole.substr(0, kHead + kRecord) + damaged.substr(kHead));
+  SimulatedValuesFile again = fileOf();
+  EXPECT_EQ(again.takeUp({3}).size(), 1U);
+  EXPECT_THAT(again.valuesOf(3), ElementsAre(0.1 * 3));
+  folder.write("v.bin", damaged);  // No. 1 is now where the second record of No. 3 was
+  EXPECT_THAT(refusalOf([&] { again.valuesOf(3); }), HasSubstr("another program has changed it"));
   EXPECT_THAT(fileOf().takeUp({1, 2, 3}), ElementsAre(testing::Key(2), testing::Key(3)));
   EXPECT_THAT(SimulatedValuesFile(folder / "v.bin", 3).takeUp({1, 2, 3}), IsEmpty()) << "of other series";
   folder.write("v.bin", whole);
