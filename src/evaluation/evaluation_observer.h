@@ -27,6 +27,12 @@ class EvaluationObserver {
     static_cast<void>(set);
     static_cast<void>(result);
   }
+  /// Writes to disk which output files of a successful model run could not be kept, before recordEvaluation() of it;
+  /// none for a run that was made again for such files and has them now.
+  virtual void recordUnkeptFiles(int number, std::span<const UnkeptFile> files) {
+    static_cast<void>(number);
+    static_cast<void>(files);
+  }
   /// Whether what recordEvaluation() has written of the simulated values is read again when they are needed, so that
   /// results need not hold them.
   virtual bool readsSimulatedValues() const { return false; }

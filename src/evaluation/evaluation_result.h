@@ -7,6 +7,7 @@
 #include <string_view>
 #include <vector>
 
+#include "evaluation/saved_files.h"
 #include "measures/file_form.h"
 #include "measures/period_series.h"
 
@@ -108,7 +109,8 @@ struct EvaluationResult {
   std::vector<MeasurePairs> pairs;
   /// Of a run that RunComparison::judge() may find to be cut off, the last lines that its batch printed.
   std::vector<std::string> lastOutput;
-  std::vector<std::string> warnings;  ///< warnings for the log, one line each
+  std::vector<std::string> warnings;    ///< warnings for the log, one line each
+  std::vector<UnkeptFile> unkeptFiles;  ///< output files that the model run has left and that could not be kept
 
   bool ok() const { return !failure.has_value(); }
   /// Makes a successful result a failed one.

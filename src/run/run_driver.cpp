@@ -237,7 +237,7 @@ void RunDriver::openResults() {
   signalState.resultFileDescriptor = results_->table().descriptor();
   reporter_ =
       std::make_unique<RunReporter>(state_, results_->table(), results_->failedRuns(), parameters_->searchSpace(),
-                                    results_->simulatedValues(), &results_->pairs());
+                                    results_->simulatedValues(), &results_->pairs(), &results_->unkeptFiles());
   openSeries();
   failedRunPolicy_.emplace(config_.plannedEvaluations(), config_.failedRunFolders);
   EarlierEvaluations* const earlier = results_->earlierEvaluations();
@@ -553,6 +553,7 @@ void RunDriver::logDifferences() {
   if (!reporter_ || std::exchange(hasLoggedDifferences_, true)) return;
   reporter_->settle(*aggregator_);
   for (const std::string& text : reporter_->differenceWarnings()) state_.log.warning(text);
+  if (const std::string text = reporter_->unkeptWarning(); !text.empty()) state_.log.warning(text);
   for (const std::string& text : reporter_->differencesOfBest()) state_.log.warning(text);
 }
 

@@ -24,13 +24,14 @@ const DifferenceTexts& textsOf(RunDifference::Kind kind) {
 }  // namespace
 
 RunReporter::RunReporter(RunState& state, ResultFile& results, FailedRunFile& failedRuns, const SearchSpace& space,
-                         SimulatedValuesFile* simulatedValues, PairsFile* pairs)
+                         SimulatedValuesFile* simulatedValues, PairsFile* pairs, UnkeptFiles* unkeptFiles)
     : state_(state),
       results_(results),
       failedRuns_(failedRuns),
       space_(space),
       simulatedValues_(simulatedValues),
       pairs_(pairs),
+      unkeptFiles_(unkeptFiles),
       initial_(ToModelScale(space, space.initial)) {}
 
 void RunReporter::message(std::string_view text) {
@@ -49,6 +50,10 @@ void RunReporter::recordEvaluation(std::span<const double> set, const Evaluation
   if (result.ok() && simulatedValues_ != nullptr) simulatedValues_->add(result);
   if (!result.pairs.empty() && pairs_ != nullptr) pairs_->add(result.number, result.pairs);
   results_.addRow(resultRow(values, result));
+}
+
+void RunReporter::recordUnkeptFiles(int number, std::span<const UnkeptFile> files) {
+  if (unkeptFiles_ != nullptr) unkeptFiles_->add(number, files);
 }
 
 void RunReporter::evaluationFinished(std::span<const double> set, const EvaluationResult& result) {
@@ -134,6 +139,15 @@ std::vector<std::string> RunReporter::differenceWarnings() const {
                                     isOne ? texts.ofOne : texts.ofSeveral, fileNameOf(results_.path()), named));
   }
   return sentences;
+}
+
+std::string RunReporter::unkeptWarning() const {
+  if (unkeptFiles_ == nullptr || unkeptFiles_->files().empty()) return {};
+  const UnkeptByNumber& files = unkeptFiles_->files();
+  return fmt::format(
+      "Output files of {} evaluation{} could not be kept, see {}; the first: No. {}. With Restart = 1 the setup makes "
+      "their model runs again",
+      files.size(), files.size() == 1 ? "" : "s", fileNameOf(unkeptFiles_->path()), files.begin()->first);
 }
 
 std::vector<std::string> RunReporter::differencesOfBest() const {

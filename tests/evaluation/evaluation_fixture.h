@@ -38,6 +38,9 @@ class RecordingObserver final : public EvaluationObserver {
     if (!found.doubtOfFirst.empty()) pairs.push_back(found.doubtOfFirst);
   }
   bool isCancelled() override { return cancelled; }
+  void recordUnkeptFiles(int number, std::span<const UnkeptFile> files) override {
+    events.push_back(fmt::format("{} lacks {}", number, files.size()));
+  }
   bool readsSimulatedValues() const override { return readsValues; }
 
   std::vector<std::string> events;

@@ -11,6 +11,7 @@
 #include "run/results/failed_run_file.h"
 #include "run/results/restart_settings.h"
 #include "run/results/simulated_values_file.h"
+#include "run/results/unkept_files.h"
 #include "run/setup_fixture.h"
 #include "temporary_folder.h"
 
@@ -255,6 +256,24 @@ TEST(SimulatedValuesFile, KeepsWholeRecordsOfTheEvaluationsThatCount) {
   EXPECT_THAT(SimulatedValuesFile(folder / "v.bin", 3).takeUp({1, 2, 3}), IsEmpty()) << "of other series";
   folder.write("v.bin", whole);
   EXPECT_THAT(fileOf(SeriesPrecision::exact).takeUp({1, 2, 3}), IsEmpty());
+}
+
+TEST(UnkeptFiles, AreThoseThatNoLaterRunHasKept) {
+  const TemporaryFolder folder;
+  UnkeptFiles first(folder / "u.dat", {"head"});
+  first.add(3, std::vector<UnkeptFile>{{"/a.csv", "full"}, {"/b.csv", "full"}});
+  first.add(1, std::vector<UnkeptFile>{{"/a.csv", "full"}});
+  first.add(5, std::vector<UnkeptFile>{{"/a.csv", "full"}});
+  first.add(1, {});
+  first.add(3, std::vector<UnkeptFile>{{"/b.csv", "late"}});
+  const std::string text = folder.read("u.dat");
+  EXPECT_THAT(text, HasSubstr("\n3\t/b.csv\tlate\n"));
+  EXPECT_EQ(UnkeptFiles(folder / "u.dat", {"head"}).goOn({1, 3, 4}, {"/a.csv", "/b.csv"}), std::set{3});
+  EXPECT_EQ(folder.read("u.dat"), "# head\nEvaluation\tFile\tReason\n3\t/b.csv\tlate\n");
+  folder.write("u.dat", text);
+  EXPECT_EQ(UnkeptFiles(folder / "u.dat", {}).goOn({1, 3, 5}, {"/a.csv"}), std::set{5});
+  EXPECT_THAT(UnkeptFiles(folder / "none.dat", {}).goOn({1}, {"/a.csv"}), IsEmpty());
+  EXPECT_FALSE(folder.exists("none.dat"));
 }
 
 TEST(FailedRunFile, IsContinuedWithTheFailuresThatCount) {
