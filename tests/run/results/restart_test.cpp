@@ -62,6 +62,17 @@ TEST_F(RestartSettingsTest, AKeywordThatAnEarlierVersionDidNotKnowWorkedAsItsDef
   EXPECT_THAT(changedSettings(then, now), IsEmpty());
 }
 
+TEST_F(RestartSettingsTest, ANameThatIsCutOffIsNotShown) {
+  RestartSettings then = restartSettings(read());
+  RestartSettings now = then;
+  for (ResultSetting& setting : then.settings) {
+    if (setting.keyword == "Parameter_Name") setting.value.clear();
+  }
+  std::erase_if(now.settings, [](const ResultSetting& setting) { return setting.keyword == "Upper_Bound"; });
+  EXPECT_THAT(changedSettings(then, now),
+              testing::Contains("Upper_Bound of MODEL_PARAMETERS/PARAMETER_1: 900 then, absent now"));
+}
+
 TEST_F(RestartSettingsTest, FilesAreHeldAgainstTheirContent) {
   const RunConfig config = read();
   const auto then = parseRestartSettings(formatRestartSettings(restartSettings(config)));
