@@ -139,10 +139,10 @@ std::optional<std::string> readFileHead(const std::string& path, std::string& re
   return readBytes(path, kFileHeadLength, reason);
 }
 
-std::optional<std::string> readFileIfThere(const std::string& path) {
+std::optional<std::string> readFileIfThere(const std::string& path, std::size_t length) {
   std::string reason;
   errno = 0;
-  auto content = readTextFile(path, reason);
+  auto content = readBytes(path, length, reason);
   if (!content && errno != ENOENT && errno != ENOTDIR) fatalError("Error: Unable to read " + path, reason);
   return content;
 }

@@ -30,8 +30,8 @@ inline constexpr std::size_t kFileHeadLength = 16384;  ///< room for the mark of
 std::optional<std::string> readFileHead(const std::string& path, std::string& reason);
 
 /// The whole content of a file; empty if there is no such file. Throws FatalError, with the system's reason, if it
-/// exists but cannot be read: it must not be mistaken for a missing one.
-std::optional<std::string> readFileIfThere(const std::string& path);
+/// exists but cannot be read: it must not be mistaken for a missing one. With a `length` only the first bytes.
+std::optional<std::string> readFileIfThere(const std::string& path, std::size_t length = std::string::npos);
 
 /// For text files that are written often and whole: removes `path` and creates it again with `mode` and `content`. On
 /// ext4 creating a file is an order of magnitude cheaper than truncating an existing one. False, with the system's

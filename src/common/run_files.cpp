@@ -12,7 +12,7 @@ std::vector<RunFile> filesOfSetup() {
                              kRunLock, kProcessLock,    kOwnFailedRuns};
   for (const ResultFileNames& names : {kPlain, kSensitivity, kOptimisation}) {
     files.insert(files.end(), {names.results, names.restart, names.simulatedValues, names.record, names.failures,
-                               names.pairs, names.checksums});
+                               names.pairs, names.checksums, names.unkept});
     files.insert(files.end(), names.tables.begin(), names.tables.end());
   }
   return files;

@@ -31,6 +31,7 @@ struct ResultFileNames {
   RunFile failures;                 ///< why evaluations failed
   RunFile pairs;                    ///< what the first successful run, and runs that differ from it, are judged by
   RunFile checksums;                ///< of the rows of the table of evaluations
+  RunFile unkept;                   ///< output files that could not be kept
   std::span<const RunFile> tables;  ///< in which the task gives what it found
 };
 
@@ -75,26 +76,23 @@ constexpr RunFile simulatedFile(std::string_view stem) {
 }
 
 /// Scenario runs and the uncertainty analysis.
-inline constexpr ResultFileNames kPlain{{"", ".dat", false, true},           restartFile("_Restart"),
-                                        simulatedFile("_Simulated"),         {"_Run", ".dat", false, true},
-                                        {"_Failures", ".dat", false, true},  {"_Pairs", ".dat", false, true},
-                                        {"_Checksums", ".dat", false, true}, kUncertaintyTables};
-inline constexpr ResultFileNames kSensitivity{{"_Sensitivity", ".dat"},
-                                              restartFile("_Sensitivity_Restart"),
-                                              simulatedFile("_Sensitivity_Simulated"),
-                                              {"_Sensitivity_Run", ".dat"},
-                                              {"_Sensitivity_Failures", ".dat"},
-                                              {"_Sensitivity_Pairs", ".dat"},
-                                              {"_Sensitivity_Checksums", ".dat"},
-                                              kSensitivityTables};
-inline constexpr ResultFileNames kOptimisation{{"_Optimisation", ".dat"},
-                                               restartFile("_Optimisation_Restart"),
-                                               simulatedFile("_Optimisation_Simulated"),
-                                               {"_Optimisation_Run", ".dat"},
-                                               {"_Optimisation_Failures", ".dat"},
-                                               {"_Optimisation_Pairs", ".dat"},
-                                               {"_Optimisation_Checksums", ".dat"},
-                                               {}};
+inline constexpr ResultFileNames kPlain{{"", ".dat", false, true},
+                                        restartFile("_Restart"),
+                                        simulatedFile("_Simulated"),
+                                        {"_Run", ".dat", false, true},
+                                        {"_Failures", ".dat", false, true},
+                                        {"_Pairs", ".dat", false, true},
+                                        {"_Checksums", ".dat", false, true},
+                                        {"_NotKept", ".dat", false, true},
+                                        kUncertaintyTables};
+inline constexpr ResultFileNames kSensitivity{
+    {"_Sensitivity", ".dat"},           restartFile("_Sensitivity_Restart"), simulatedFile("_Sensitivity_Simulated"),
+    {"_Sensitivity_Run", ".dat"},       {"_Sensitivity_Failures", ".dat"},   {"_Sensitivity_Pairs", ".dat"},
+    {"_Sensitivity_Checksums", ".dat"}, {"_Sensitivity_NotKept", ".dat"},    kSensitivityTables};
+inline constexpr ResultFileNames kOptimisation{
+    {"_Optimisation", ".dat"},           restartFile("_Optimisation_Restart"), simulatedFile("_Optimisation_Simulated"),
+    {"_Optimisation_Run", ".dat"},       {"_Optimisation_Failures", ".dat"},   {"_Optimisation_Pairs", ".dat"},
+    {"_Optimisation_Checksums", ".dat"}, {"_Optimisation_NotKept", ".dat"},    {}};
 
 inline constexpr std::string_view kFailuresMark = "# Failed evaluations of ";
 /// Stands beside the setup without its name, for the run that was the first of those going on in the folder; another

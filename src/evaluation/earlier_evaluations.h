@@ -2,7 +2,9 @@
 
 #include <map>
 #include <optional>
+#include <set>
 #include <span>
+#include <utility>
 #include <vector>
 
 #include "evaluation/evaluation_result.h"
@@ -31,12 +33,17 @@ class EarlierEvaluations final {
   /// Whether the evaluation with this number needs a model run before its result is taken.
   bool repeatsRun(int number) const;
 
+  /// The evaluations whose model is run again for the output files that it leaves; their results are the earlier ones.
+  void runAgain(std::set<int> numbers) { runAgain_ = std::move(numbers); }
+  bool isRunAgain(int number) const { return runAgain_.contains(number); }
+
  private:
   void requireSameValues(int number, std::span<const double> earlier, std::span<const double> set) const;
 
   SearchSpace space_;
   const ObjectiveAggregator& aggregator_;
   std::map<int, Record> records_;
+  std::set<int> runAgain_;
 };
 
 }  // namespace mirevo

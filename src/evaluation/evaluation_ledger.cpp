@@ -12,13 +12,19 @@ void EvaluationLedger::begin(std::span<const ParameterSet> sets, DispatchMode mo
   isFinished_.assign(sets.size(), false);
   next_ = 0;
   returned_.clear();
+  runAgain_.clear();
   finishedCount_ = 0;
   openCount_ = 0;
   isFinalRun_ = mode == DispatchMode::finalRun;
   if (earlier_ == nullptr || isFinalRun_) return;
   for (std::size_t place = 0; place < sets.size(); ++place) {
     if (earlier_->repeatsRun(numberOf(place))) continue;
-    if (auto result = earlier_->take(numberOf(place), sets[place])) replay(place, std::move(*result));
+    auto result = earlier_->take(numberOf(place), sets[place]);
+    if (!result) continue;
+    replay(place, std::move(*result));
+    if (!earlier_->isRunAgain(numberOf(place))) continue;
+    runAgain_.insert(place);
+    returned_.insert(place);
   }
 }
 
@@ -33,6 +39,7 @@ void EvaluationLedger::replay(std::size_t place, EvaluationResult result) {
 void EvaluationLedger::store(std::size_t place, EvaluationResult result) {
   // Not needed any more; the batch keeps its results until it is complete.
   result.shownSeries = {};
+  if (observer_.readsSimulatedValues()) result.simulatedValues = std::vector<double>();  // {} would keep its memory
   const EvaluationResult& stored = results_[place] = std::move(result);
   isFinished_[place] = true;
   ++finishedCount_;
@@ -74,6 +81,12 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
     // A set that cannot be run is no model run error, even if it is an equation that has no finite value.
     outcome = result.failure->isOfConstraints() ? progress::kConstraintsViolated : progress::kModelRunError;
   }
+  if (runAgain_.erase(place) > 0) {
+    observer_.message(progress::completedMessage(result.number, outcome));
+    return finishAgain(place, result);
+  }
+  const bool isNews = !result.unkeptFiles.empty() || (earlier_ != nullptr && earlier_->isRunAgain(result.number));
+  if (result.ok() && isNews) observer_.recordUnkeptFiles(result.number, result.unkeptFiles);
   std::optional<EvaluationResult> known;  // a repeated run has its row already, which is kept
   if (earlier_ != nullptr) known = earlier_->take(result.number, sets_[place]);
   ComparisonFindings found;
@@ -90,6 +103,16 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
   observer_.evaluationFinished(sets_[place], result);
   tell(std::move(found));
   store(place, std::move(result));
+}
+
+/// Its result is known from an earlier run, whose output files could not all be kept.
+void EvaluationLedger::finishAgain(std::size_t place, const EvaluationResult& result) {
+  const std::string again = progress::nameOfEvaluation(result.number) + " was made again for its output files: ";
+  if (!result.ok()) return observer_.warning(again + "the model run failed: " + result.failure->reason);
+  if (result.measureValues != results_[place].measureValues) {
+    observer_.warning(again + "the model run has other results than before, which are kept");
+  }
+  observer_.recordUnkeptFiles(result.number, result.unkeptFiles);
 }
 
 void EvaluationLedger::tell(ComparisonFindings found) {
@@ -122,6 +145,7 @@ std::vector<EvaluationResult> EvaluationLedger::close() {
   isFinished_.clear();
   next_ = 0;
   returned_.clear();
+  runAgain_.clear();
   finishedCount_ = 0;
   openCount_ = 0;
   return std::exchange(results_, {});

@@ -35,7 +35,8 @@ class EvaluationLedger final {
         runComparison_(std::move(runComparison)) {}
 
   /// Opens the next batch of the run; `place` below is the 0-based index of a set in it.
-  /// Sets that an earlier run has evaluated get their results at once, unless `mode` requires their model runs. Throws
+  /// Sets that an earlier run has evaluated get their results at once, unless `mode` requires their model runs; the
+  /// model is run for the output files of those that are EarlierEvaluations::isRunAgain(). Throws
   /// FatalError when the failed-run limit is exceeded, and if an earlier evaluation was of another set.
   void begin(std::span<const ParameterSet> sets, DispatchMode mode);
   /// The next set, in order, that has no result yet; empty when all are taken, and as long as a model run may become
@@ -62,7 +63,7 @@ class EvaluationLedger final {
   bool isFolderWanted(const EvaluationResult& result) const {
     return !result.ok() && failedRuns_.isFolderWanted(*result.failure);
   }
-  bool isComplete() const { return finishedCount_ == sets_.size(); }
+  bool isComplete() const { return finishedCount_ == sets_.size() && runAgain_.empty(); }
   /// Closes a complete batch and returns one result per set, in order. Warns if no model run so far depends on the
   /// parameters.
   std::vector<EvaluationResult> end();
@@ -75,6 +76,7 @@ class EvaluationLedger final {
   void tell(ComparisonFindings found);
   void replay(std::size_t place, EvaluationResult result);
   void store(std::size_t place, EvaluationResult result);
+  void finishAgain(std::size_t place, const EvaluationResult& result);
   std::vector<EvaluationResult> close();
 
   EvaluationObserver& observer_;
@@ -85,12 +87,13 @@ class EvaluationLedger final {
   bool isFinalRun_ = false;
   std::vector<ParameterSet> sets_;  ///< the ledger's own: an unfinished batch outlives its caller
   std::vector<EvaluationResult> results_;
-  std::vector<bool> isFinished_;                    ///< whether a set has its result
-  std::size_t next_ = 0;                            ///< first set that was not taken
-  std::set<std::size_t> returned_;                  ///< sets that were taken and put back
-  std::size_t finishedCount_ = 0;                   ///< sets that have a result
-  std::size_t openCount_ = 0;                       ///< sets that were taken and have no result
-  int evaluationCount_ = 0;                         ///< sets of the batches before this one
+  std::vector<bool> isFinished_;    ///< whether a set has its result
+  std::size_t next_ = 0;            ///< first set that was not taken
+  std::set<std::size_t> returned_;  ///< sets that were taken and put back, and those of runAgain_
+  std::set<std::size_t> runAgain_;  ///< sets that have a result, whose model is run for its output files alone
+  std::size_t finishedCount_ = 0;   ///< sets that have a result
+  std::size_t openCount_ = 0;       ///< sets that were taken and have no result
+  int evaluationCount_ = 0;         ///< sets of the batches before this one
   std::set<std::pair<int, std::size_t>> warnedOf_;  ///< evaluations and measures with unused observations
   std::map<std::size_t, std::size_t> fewestUsed_;   ///< by measure, the fewest observations used of which a warning was
                                                     ///< given

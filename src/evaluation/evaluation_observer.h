@@ -29,6 +29,15 @@ class EvaluationObserver {
     static_cast<void>(set);
     static_cast<void>(result);
   }
+  /// Writes to disk which output files of a successful model run could not be kept, before recordEvaluation() of it;
+  /// none for a run that was made again for such files and has them now.
+  virtual void recordUnkeptFiles(int number, std::span<const UnkeptFile> files) {
+    static_cast<void>(number);
+    static_cast<void>(files);
+  }
+  /// Whether what recordEvaluation() has written of the simulated values is read again when they are needed, so that
+  /// results need not hold them.
+  virtual bool readsSimulatedValues() const { return false; }
   /// An evaluation has finished, in order of arrival; `set` is on the search scale. Called before its result is used.
   virtual void evaluationFinished(std::span<const double> set, const EvaluationResult& result) = 0;
   /// An evaluation has its result from an earlier run instead of the model. It counts like any other.

@@ -7,6 +7,7 @@
 #include <string_view>
 #include <vector>
 
+#include "evaluation/saved_files.h"
 #include "measures/file_form.h"
 #include "measures/period_series.h"
 
@@ -96,7 +97,7 @@ struct EvaluationResult {
   std::vector<double> exactMeasures;
   /// If the task asks for them, the simulated values at the observation times of ModelRunner::observedSeries(), one
   /// series after another, NaN where the model has none; exact ones with their units, see appendSimulatedValues().
-  /// Empty for a failed evaluation.
+  /// Empty for a failed evaluation, and once it has been reported if EvaluationObserver::readsSimulatedValues().
   std::vector<double> simulatedValues;
   /// For an evaluation that may be shown as the initial or the best one, its simulated series, one per measure of
   /// ModelRunner::shownMeasures(). Empty for all others, and once the evaluation has been reported.
@@ -109,7 +110,8 @@ struct EvaluationResult {
   std::vector<MeasurePairs> pairs;
   /// Of a run that RunComparison::judge() may find to be cut off, the last lines that its batch printed.
   std::vector<std::string> lastOutput;
-  std::vector<std::string> warnings;  ///< warnings for the log, one line each
+  std::vector<std::string> warnings;    ///< warnings for the log, one line each
+  std::vector<UnkeptFile> unkeptFiles;  ///< output files that the model run has left and that could not be kept
 
   bool ok() const { return !failure.has_value(); }
   /// Makes a successful result a failed one.

@@ -435,8 +435,9 @@ bool ModelRunner::mayBeCutOff(const EvaluationResult& result) const {
 }
 
 void ModelRunner::keepOutputFiles(int slot, int number, EvaluationResult& result) const {
-  for (std::string& problem : savedFiles_.save(launcher_.getProcessFolder(slot), number)) {
-    result.warnings.push_back(std::move(problem));
+  for (UnkeptFile& file : savedFiles_.save(launcher_.getProcessFolder(slot), number)) {
+    result.warnings.push_back(file.reason);
+    if (!file.isModelsDoing) result.unkeptFiles.push_back(std::move(file));
   }
 }
 

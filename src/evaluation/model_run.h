@@ -76,8 +76,8 @@ class ModelRunner final {
   /// observations are at fault.
   EvaluationResult collect(int slot, std::function<void()> look = {});
 
-  /// Keeps the output files of the slot's run, which belongs to evaluation `number`; adds warnings to `result` for
-  /// files that could not be kept. To be called before the slot's next run.
+  /// Keeps the output files of the slot's run, which belongs to evaluation `number`; adds those that could
+  /// not be kept to `result`, with warnings. To be called before the slot's next run.
   void keepOutputFiles(int slot, int number, EvaluationResult& result) const;
 
   /// Keeps a copy of the slot's folder after a failed run; adds a line to `warnings` when that is not possible.

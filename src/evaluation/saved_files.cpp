@@ -42,24 +42,31 @@ void SavedFiles::markAsOld(const std::string& processFolder) const {
   }
 }
 
-std::vector<std::string> SavedFiles::save(const std::string& processFolder, int number) const {
-  std::vector<std::string> problems;
+std::vector<UnkeptFile> SavedFiles::save(const std::string& processFolder, int number) const {
+  std::vector<UnkeptFile> problems;
   if (names_.empty()) return problems;
   // Files that an interrupted run has kept from this evaluation are not of this model run.
   std::error_code failedToRemove;
   const std::string earlier = fmt::format("{}/{}", folder_, number);
   std::filesystem::remove_all(earlier, failedToRemove);
-  if (failedToRemove) problems.push_back(fmt::format("{} was not removed: {}", earlier, failedToRemove.message()));
+  const std::string notRemoved =
+      failedToRemove ? fmt::format("{} was not removed: {}", earlier, failedToRemove.message()) : std::string();
   for (const std::string& name : names_) {
     const std::string source = processFolder + name;
     const std::string target = fmt::format("{}/{}{}", folder_, number, name);
-    std::string reason;
+    std::string reason = notRemoved;
+    bool isModelsDoing = false;
     struct stat status {};
-    if (::stat(source.c_str(), &status) != 0) {
+    if (!reason.empty()) {
+      // What is there is not of this run, so that nothing may be added to it.
+    } else if (::stat(source.c_str(), &status) != 0) {
+      isModelsDoing = errno == ENOENT || errno == ENOTDIR;
       reason = std::strerror(errno);
     } else if (isMarked(status)) {
+      isModelsDoing = true;
       reason = "the model run did not write it";
     } else if (const auto link = findLeavingLink(processFolder, name)) {
+      isModelsDoing = true;
       reason = describe(*link);
     } else {
       std::error_code failed;
@@ -69,8 +76,9 @@ std::vector<std::string> SavedFiles::save(const std::string& processFolder, int 
       } else if (copyWhole(source, target, reason)) {
         continue;
       }
+      isModelsDoing = !S_ISREG(status.st_mode);
     }
-    problems.push_back(fmt::format("{} was not kept: {}", source, reason));
+    problems.push_back({name, fmt::format("{} was not kept: {}", source, reason), isModelsDoing});
   }
   return problems;
 }

@@ -5,6 +5,13 @@
 
 namespace mirevo {
 
+/// A file that was not kept.
+struct UnkeptFile {
+  std::string name;            ///< below the base folder, with its leading "/"
+  std::string reason;          ///< one line for a person
+  bool isModelsDoing = false;  ///< the model run has left nothing that could be kept
+};
+
 /// The model's output files that are kept from every model run, each run's in a folder named by its evaluation number.
 class SavedFiles final {
  public:
@@ -15,9 +22,9 @@ class SavedFiles final {
   /// Before a run: marks the files that are in the process folder already, so that save() can tell them from those that
   /// the run writes. They are not removed, as the model may read them.
   void markAsOld(const std::string& processFolder) const;
-  /// After a run: copies each file to folder/number, with its path below the base folder. Returns one line for each
-  /// file that could not be kept, or that the run did not write.
-  std::vector<std::string> save(const std::string& processFolder, int number) const;
+  /// After a run: copies each file to folder/number, with its path below the base folder. Returns those that could not
+  /// be kept, or that the run did not write.
+  std::vector<UnkeptFile> save(const std::string& processFolder, int number) const;
 
  private:
   std::vector<std::string> names_;  ///< below the base folder, with their leading "/"

@@ -237,9 +237,10 @@ void RunDriver::openResults() {
   results_->open(config_, runner_->observedSeries(), *aggregator_, state_.log);
   putEarlierReportAside();
   signalState.resultFileDescriptor = results_->table().descriptor();
-  reporter_ = std::make_unique<RunReporter>(state_, results_->table(), results_->failedRuns(),
-                                            parameters_->searchSpace(), results_->simulatedValues(), &results_->pairs(),
-                                            measureSources(config_.measures, config_.measureFile, config_.baseFolder));
+  reporter_ =
+      std::make_unique<RunReporter>(state_, results_->table(), results_->failedRuns(), parameters_->searchSpace(),
+                                    results_->simulatedValues(), &results_->pairs(), &results_->unkeptFiles(),
+                                    measureSources(config_.measures, config_.measureFile, config_.baseFolder));
   openSeries();
   failedRunPolicy_.emplace(config_.plannedEvaluations(), config_.failedRunFolders);
   EarlierEvaluations* const earlier = results_->earlierEvaluations();
@@ -355,7 +356,10 @@ TaskContext RunDriver::taskContext() {
           parameterFields(*parameters_, widestPlaceholders(runner_->templates(), config_.parameters.size())),
           [this](std::span<const double> values) { return aggregator_->aggregate(values); },
           parameters_->feasibility(),
-          [this](std::string_view text) { warn(text); }};
+          [this](std::string_view text) { warn(text); },
+          [this](std::span<const int> numbers, std::size_t first, std::size_t count) {
+            return results_->simulatedValues()->columns(numbers, first, count);
+          }};
 }
 
 TaskOutcome RunDriver::runTask() {
@@ -552,6 +556,7 @@ void RunDriver::logDifferences() {
   if (!reporter_ || std::exchange(hasLoggedDifferences_, true)) return;
   reporter_->settle(*aggregator_);
   for (const std::string& text : reporter_->differenceWarnings()) state_.log.warning(text);
+  if (const std::string text = reporter_->unkeptWarning(); !text.empty()) state_.log.warning(text);
   for (const std::string& text : reporter_->differencesOfBest()) state_.log.warning(text);
   if (const auto text = reporter_->processesLeftWarning()) state_.log.warning(*text);
 }

@@ -27,13 +27,15 @@ const DifferenceTexts& textsOf(RunDifference::Kind kind) {
 }  // namespace
 
 RunReporter::RunReporter(RunState& state, ResultFile& results, FailedRunFile& failedRuns, const SearchSpace& space,
-                         SimulatedValuesFile* simulatedValues, PairsFile* pairs, std::vector<MeasureSource> sources)
+                         SimulatedValuesFile* simulatedValues, PairsFile* pairs, UnkeptFiles* unkeptFiles,
+                         std::vector<MeasureSource> sources)
     : state_(state),
       results_(results),
       failedRuns_(failedRuns),
       space_(space),
       simulatedValues_(simulatedValues),
       pairs_(pairs),
+      unkeptFiles_(unkeptFiles),
       sources_(std::move(sources)),
       initial_(ToModelScale(space, space.initial)) {}
 
@@ -72,6 +74,10 @@ void RunReporter::recordEvaluation(std::span<const double> set, const Evaluation
   results_.addRow(resultRow(values, result));
 }
 
+void RunReporter::recordUnkeptFiles(int number, std::span<const UnkeptFile> files) {
+  if (unkeptFiles_ != nullptr) unkeptFiles_->add(number, files);
+}
+
 void RunReporter::evaluationFinished(std::span<const double> set, const EvaluationResult& result) {
   if (!result.ok()) state_.log.line("   " + result.failure->reason);  // follows the message that it failed
   const std::vector<double> values = ToModelScale(space_, set);
@@ -95,7 +101,9 @@ void RunReporter::evaluationReplayed(std::span<const double> set, const Evaluati
   if (!result.shownSeries.empty()) {
     recordSeries(values, result);
   } else if (result.ok() && recorder_ != nullptr) {
-    recorder_->evaluationPassed(result, values, best());
+    EvaluationResult passed = result;
+    if (readsSimulatedValues()) passed.simulatedValues = simulatedValues_->valuesOf(result.number);
+    recorder_->evaluationPassed(passed, values, best());
   }
 }
 
@@ -156,6 +164,15 @@ std::vector<std::string> RunReporter::differenceWarnings() const {
                                     isOne ? texts.ofOne : texts.ofSeveral, fileNameOf(results_.path()), named));
   }
   return sentences;
+}
+
+std::string RunReporter::unkeptWarning() const {
+  if (unkeptFiles_ == nullptr || unkeptFiles_->files().empty()) return {};
+  const UnkeptByNumber& files = unkeptFiles_->files();
+  return fmt::format(
+      "Output files of {} evaluation{} could not be kept, see {}; the first: No. {}. With Restart = 1 the setup makes "
+      "their model runs again",
+      files.size(), files.size() == 1 ? "" : "s", fileNameOf(unkeptFiles_->path()), files.begin()->first);
 }
 
 std::vector<std::string> RunReporter::differencesOfBest() const {

@@ -18,6 +18,7 @@
 #include "run/results/result_file.h"
 #include "run/results/series_recorder.h"
 #include "run/results/simulated_values_file.h"
+#include "run/results/unkept_files.h"
 #include "run/run_state.h"
 
 namespace mirevo {
@@ -26,11 +27,11 @@ namespace mirevo {
 class RunReporter final : public EvaluationObserver {
  public:
   /// The result file must be open; all must outlive the reporter. `simulatedValues` receives the
-  /// simulated values of every successful evaluation, `pairs` the pairs that are to be kept; both may be null.
-  /// `sources`: of all output measures.
+  /// simulated values of every successful evaluation, `pairs` the pairs that are to be kept, `unkeptFiles` the output
+  /// files that could not be kept; all may be null. `sources`: of all output measures.
   RunReporter(RunState& state, ResultFile& results, FailedRunFile& failedRuns, const SearchSpace& space,
               SimulatedValuesFile* simulatedValues = nullptr, PairsFile* pairs = nullptr,
-              std::vector<MeasureSource> sources = {});
+              UnkeptFiles* unkeptFiles = nullptr, std::vector<MeasureSource> sources = {});
 
   /// From now on `recorder` records the series of the initial and the best evaluation; it must outlive the reporter.
   void recordSeries(SeriesRecorder& recorder) { recorder_ = &recorder; }
@@ -39,6 +40,8 @@ class RunReporter final : public EvaluationObserver {
   void warning(std::string_view text) override;
   void processesLeft(std::string_view text) override;
   void recordEvaluation(std::span<const double> set, const EvaluationResult& result) override;
+  bool readsSimulatedValues() const override { return simulatedValues_ != nullptr && simulatedValues_->isReadBack(); }
+  void recordUnkeptFiles(int number, std::span<const UnkeptFile> files) override;
   void evaluationFinished(std::span<const double> set, const EvaluationResult& result) override;
   void evaluationReplayed(std::span<const double> set, const EvaluationResult& result) override;
   void runCompared(const ComparisonFindings& found) override;
@@ -61,6 +64,8 @@ class RunReporter final : public EvaluationObserver {
   std::vector<std::string> differenceLines() const;
   /// A sentence for each kind of difference that says how many evaluations there are, and where those lines are.
   std::vector<std::string> differenceWarnings() const;
+  /// Says how many evaluations lack output files; empty if none does.
+  std::string unkeptWarning() const;
   /// Sentences that say so of the best evaluation.
   std::vector<std::string> differencesOfBest() const;
   /// A sentence that says how many model runs left processes running, if there was more than one.
@@ -97,6 +102,7 @@ class RunReporter final : public EvaluationObserver {
   const SearchSpace& space_;
   SimulatedValuesFile* simulatedValues_;
   PairsFile* pairs_;
+  UnkeptFiles* unkeptFiles_;
   std::vector<MeasureSource> sources_;
   SeriesRecorder* recorder_ = nullptr;
   BestChoice best_;

@@ -38,10 +38,15 @@ class RecordingObserver final : public EvaluationObserver {
     if (!found.doubtOfFirst.empty()) pairs.push_back(found.doubtOfFirst);
   }
   bool isCancelled() override { return cancelled; }
+  void recordUnkeptFiles(int number, std::span<const UnkeptFile> files) override {
+    events.push_back(fmt::format("{} lacks {}", number, files.size()));
+  }
+  bool readsSimulatedValues() const override { return readsValues; }
 
   std::vector<std::string> events;
   std::vector<std::string> pairs;  ///< what is told of them
   bool cancelled = false;
+  bool readsValues = false;
 };
 
 /// A model of one parameter `a` in [0, 10] whose simulated series is the constant a and whose observed one is 1: the

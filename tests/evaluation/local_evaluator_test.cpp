@@ -49,6 +49,15 @@ TEST_F(LocalEvaluatorTest, OneSlotRunsOneSetAfterAnother) {
   EXPECT_LE(launcher.longestWait, 3.0);
 }
 
+TEST_F(LocalEvaluatorTest, SimulatedValuesThatAreReadAgainTakeNoMemory) {
+  description_.keepSimulatedValues = true;
+  FakeLauncher launcher([&](int, const std::string&) { return computes(1.0); });
+  LocalEvaluator& evaluator = makeEvaluator(launcher, 1, 100);
+  EXPECT_THAT(evaluate(evaluator, {2.0}).at(0).simulatedValues, testing::Each(2.0));
+  observer_.readsValues = true;
+  EXPECT_EQ(evaluate(evaluator, {2.0}).at(0).simulatedValues.capacity(), 0U);
+}
+
 TEST_F(LocalEvaluatorTest, EverySetsOutputIsSavedUnderItsNumberAndAFailedOnesIsNot) {
   description_.savedFiles = {folder_ / "base/simulated.csv"};
   description_.savedFolder = folder_ / "run_Saved";
@@ -342,6 +351,40 @@ TEST_F(LocalEvaluatorTest, WhatAnEarlierRunHasEvaluatedIsNotRunAgain) {
   results = evaluate(evaluator, {6.0}, DispatchMode::finalRun);
   EXPECT_EQ(launcher.starts, 3);
   EXPECT_EQ(observer_.events.back(), "replay 5 a=6 OK");
+}
+
+TEST_F(LocalEvaluatorTest, ARunWhoseOutputFilesCouldNotBeKeptIsMadeAgainForThemAlone) {
+  folder_.write("file", "");
+  // Where files are kept, by how much the model run differs from before, what is told.
+  const std::tuple<const char*, double, std::vector<std::string>> cases[] = {
+      {"run_Saved", 0.0, {"2 lacks 0"}},
+      {"run_Saved", 0.5, {"has other results than before, which are kept", "2 lacks 0"}},
+      {"run_Saved", 1e9, {"not kept: No such file", "the model run failed"}},
+      {"file/run_Saved", 0.0, {" was not kept: ", "2 lacks 1", " was not kept: ", "4 lacks 1"}}};
+  for (const auto& [where, change, told] : cases) {
+    description_.savedFiles = {folder_ / "base/simulated.csv"};
+    description_.savedFolder = folder_ / where;
+    takeUp({{1, 2.0}, {2, 4.0}, {3, 6.0}});
+    earlier_->runAgain({2});
+    FakeLauncher launcher([&, change = change](int start, const std::string&) {
+      return start == 1 && change > 1.0 ? fails(1.0) : computes(1.0, start == 1 ? 4.0 + change : 0.0);
+    });
+    observer_.events.clear();
+    const auto results = evaluate(makeEvaluator(launcher, 1, 100), {2.0, 4.0, 6.0, 8.0});
+    EXPECT_THAT(measuresOf(results), ElementsAre(1.0, 3.0, 5.0, 7.0)) << where << change;
+    std::vector<testing::Matcher<std::string>> matchers;
+    for (const std::string& text : told) matchers.push_back(HasSubstr(text));
+    std::erase_if(observer_.events, [](const std::string& event) {
+      return event.find("again") == event.npos && event.find(" not kept") == event.npos &&
+             event.find(" lacks ") == event.npos;
+    });
+    EXPECT_THAT(observer_.events, testing::ElementsAreArray(matchers)) << where << change;
+    EXPECT_FALSE(folder_.exists("run_Saved/1"));
+    if (where == std::string("run_Saved") && change <= 1.0) {
+      EXPECT_EQ(folder_.read("run_Saved/2/simulated.csv"), series(4.0 + change));
+    }
+    std::filesystem::remove_all(folder_ / "run_Saved");
+  }
 }
 
 TEST_F(LocalEvaluatorTest, AnotherSetUnderTheSameNumberIsNoReplay) {

@@ -41,15 +41,6 @@ std::string excerpt(const std::string& text) {
   return text.size() < 600 ? text : text.substr(0, 300) + " ... " + text.substr(text.size() - 300);
 }
 
-/// Whether `problem` is the lack of a saved file that the log says was not kept.
-bool isOfFileNotKept(const std::string& problem, const std::string& log) {
-  int number = 0;
-  if (std::sscanf(problem.c_str(), "not as in an undisturbed run: basin_Saved/%d/", &number) != 1) return false;
-  const auto start = log.find(fmt::format("Warning: Evaluation of parameter set No. {}: ", number));
-  return start != std::string::npos &&
-         log.substr(start, log.find('\n', start) - start).find(" was not kept: ") != std::string::npos;
-}
-
 /// The rows of a result file by their number, line ends included; `torn` is what stands behind the last line end.
 std::map<int, std::string> rowsOf(const std::string& text, std::string& torn) {
   std::map<int, std::string> rows;
@@ -290,15 +281,10 @@ bool FaultyRun::hasFailedEvaluation() const {
 std::vector<std::string> FaultyRun::checkNextRun() const {
   const std::size_t known = rowNumbers(folder_).size();
   const bool failuresStand = restarts_ && hasFailedEvaluation();
-  const std::string logBefore = folder_.read("basin.log");
   const ProgramResult result = run({});
   const bool endsInFailures = failuresStand && result.error.find("No of failed simulations") != std::string::npos;
   if (result.exitCode != 0 && !endsInFailures) return {"the setup cannot be run again: " + excerpt(result.error)};
   std::vector<std::string> problems = failuresStand ? checkRows({.mayFailEvaluation = true}) : checkOutputs();
-  // Evaluations that are taken up are not made again, and so their saved files are not.
-  if (restarts_) {
-    std::erase_if(problems, [&](const std::string& problem) { return isOfFileNotKept(problem, logBefore); });
-  }
   const std::string taken = fmt::format("Restart: {} evaluations are taken from", known);
   if (restarts_ && known > 0 && folder_.read("basin.log").find(taken) == std::string::npos) {
     problems.push_back(fmt::format("not all of the {} evaluations that stood were taken up", known));

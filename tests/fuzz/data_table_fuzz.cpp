@@ -5,12 +5,9 @@
 
 #include "common/data_table.h"
 #include "require.h"
-#include "run/results/failure_table.h"
 #include "run/results/pairs_file.h"
-#include "run/results/restart_settings.h"
 #include "run/results/row_checksums.h"
 #include "run/results/run_record.h"
-#include "run/results/series_table.h"
 
 namespace {
 
@@ -23,12 +20,6 @@ std::string tableText(const mirevo::ReadTable& read) {
 std::string recordText(std::string_view text) {
   const auto record = mirevo::readRunRecord(text);
   return record ? mirevo::runRecordText(*record, {}) : std::string();
-}
-
-std::string failureText(std::string_view text) {
-  std::string rows = mirevo::failureTableHead({});
-  for (const mirevo::FailureRow& row : mirevo::readFailureTable(text)) rows += mirevo::failureRowText(row);
-  return rows;
 }
 
 std::string checksumText(std::string_view text) {
@@ -53,12 +44,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     require(again.columns == table.columns && again.rows == table.rows);
   }
   require(recordText(recordText(text)) == recordText(text));
-  require(failureText(failureText(text)) == failureText(text));
   require(checksumText(checksumText(text)) == checksumText(text));
-  mirevo::readSeriesTable(text);
   require(pairsText(pairsText(pairsText(text))) == pairsText(pairsText(text)));  // 9999-12-31 24:00 has no second time
-  if (const auto settings = mirevo::parseRestartSettings(text)) {
-    require(mirevo::parseRestartSettings(mirevo::formatRestartSettings(*settings)).has_value());
-  }
   return 0;
 }

@@ -20,16 +20,21 @@ std::string cell(double value) {
 
 }  // namespace
 
-SeriesBand seriesBand(std::span<const double> observed, std::span<const EvaluationResult> results, std::size_t first) {
+SeriesBand seriesBand(std::span<const double> observed, std::size_t evaluations, const ReadColumns& read) {
+  // A MB at a time; of more than ten thousand evaluations more, as every time costs a walk through all of them.
+  constexpr std::size_t kValuesAtOnce = std::size_t{1} << 17;
+  constexpr std::size_t kMostWalks = 32;
+  const std::size_t atOnce =
+      std::max(kValuesAtOnce / std::max<std::size_t>(evaluations, 1), observed.size() / kMostWalks + 1);
   SeriesBand band;
   std::size_t inside = 0;
+  std::vector<double> columns;
   std::vector<double> values;
   std::vector<std::size_t> runs;
   for (std::size_t t = 0; t < observed.size(); ++t) {
+    if (t % atOnce == 0) columns = read(t, std::min(atOnce, observed.size() - t));
     values.clear();
-    for (const EvaluationResult& result : results) {
-      if (first + t >= result.simulatedValues.size()) continue;  // it failed
-      const double value = result.simulatedValues[first + t];
+    for (const double value : std::span(columns).subspan(t % atOnce * evaluations, evaluations)) {
       if (std::isfinite(value)) values.push_back(value);
     }
     std::sort(values.begin(), values.end());

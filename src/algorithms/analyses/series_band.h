@@ -1,12 +1,12 @@
 #pragma once
 
 #include <cstddef>
+#include <functional>
 #include <span>
 #include <string>
 #include <string_view>
 #include <vector>
 
-#include "evaluation/evaluation_result.h"
 #include "measures/observed_series.h"
 
 namespace mirevo {
@@ -23,9 +23,13 @@ struct SeriesBand {
   double shareInside = 0.0;          ///< share of those inside the band, limits included; NaN when there are none
 };
 
-/// The band over the successful evaluations for the series whose simulated values begin at index `first` of each
-/// evaluation's simulated values; `observed` holds its observations. Values that are not finite are left out.
-SeriesBand seriesBand(std::span<const double> observed, std::span<const EvaluationResult> results, std::size_t first);
+/// The simulated values of all successful evaluations at `count` observations of a series from index `first` on; those
+/// at the same observation side by side.
+using ReadColumns = std::function<std::vector<double>(std::size_t first, std::size_t count)>;
+
+/// The band over `evaluations` successful ones; `observed` holds the observations. Asks for the values of a few
+/// observations at a time. Values that are not finite are left out.
+SeriesBand seriesBand(std::span<const double> observed, std::size_t evaluations, const ReadColumns& read);
 
 /// "its quantiles are of 3 to 20 runs ..."; empty where all are of equally many.
 std::string fewerRunsText(const SeriesBand& band);

@@ -50,8 +50,12 @@ struct Layout<EvaluationResult> {
   static void of(auto& archive, auto& result) {
     archive(result.measureValues, result.objectiveValues, result.aggregate, result.exactMeasures,
             result.simulatedValues, result.failure, result.unusedObservations, result.pairs, result.lastOutput,
-            result.warnings, result.shownSeries);
+            result.warnings, result.unkeptFiles, result.shownSeries);
   }
+};
+template <>
+struct Layout<UnkeptFile> {
+  static void of(auto& archive, auto& file) { archive(file.name, file.reason); }
 };
 template <>
 struct Layout<RunStandard> {
@@ -136,6 +140,10 @@ class Writer final {
 class Reader final {
  public:
   explicit Reader(std::string_view content) : rest_(content) {}
+  [[noreturn]] static void refuse() {
+    fatalError(kCommunicationFailed,
+               "a message has another form than expected: do all processes of the job run the same Mirevo?");
+  }
 
   template <class... Fields>
   void operator()(Fields&... fields) {
@@ -185,10 +193,6 @@ class Reader final {
     const std::string_view taken = rest_.substr(0, count);
     rest_.remove_prefix(count);
     return taken;
-  }
-  [[noreturn]] static void refuse() {
-    fatalError(kCommunicationFailed,
-               "a message has another form than expected: do all processes of the job run the same Mirevo?");
   }
 
   std::string_view rest_;
@@ -241,7 +245,11 @@ std::string encode(const ResultMessage& message) {
 }
 
 ResultMessage decodeResult(std::string_view content) {
-  return read<ResultMessage>(content);
+  auto message = read<ResultMessage>(content);
+  const auto& failure = message.result.failure;
+  if (failure && failure->kind > EvaluationFailure::Kind::notKnown) Reader::refuse();
+  if (failure && failure->kind < EvaluationFailure::Kind{}) Reader::refuse();
+  return message;
 }
 
 std::string encode(const KeepFolderMessage& message) {

@@ -103,6 +103,26 @@ bool RecordFile::tryAppend(std::string_view record, std::string& reason) {
   return true;
 }
 
+bool RecordFile::tryRead(std::int64_t offset, char* bytes, std::size_t size, std::string& reason) const {
+  while (size > 0) {
+    const ssize_t count = ::pread(descriptor_, bytes, size, offset);
+    if (count < 0 && errno == EINTR) continue;
+    if (count <= 0) {
+      reason = count < 0 ? std::strerror(errno) : "it ends too early";
+      return false;
+    }
+    offset += count;
+    bytes += count;
+    size -= static_cast<std::size_t>(count);
+  }
+  return true;
+}
+
+void RecordFile::cutTo(std::int64_t size) {
+  if (::ftruncate(descriptor_, size) != 0) fatalError("Error: Unable to write to " + path_, std::strerror(errno));
+  size_ = size;
+}
+
 void RecordFile::close() {
   std::string reason;
   if (!tryClose(reason)) fatalError("Error: Unable to write to " + path_, reason);

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <string>
 #include <string_view>
@@ -35,6 +36,10 @@ class RecordFile final {
 
   /// Throws FatalError with the system's reason if not everything written has reached the file.
   void close();
+  /// Reads bytes written before, `size` of them from `offset` on. False, with the reason, if that fails.
+  bool tryRead(std::int64_t offset, char* bytes, std::size_t size, std::string& reason) const;
+  /// Cuts off what is behind the first `size` bytes. Throws FatalError with the system's reason.
+  void cutTo(std::int64_t size);
   /// Like close(), but returns false, with the system's reason, instead of throwing.
   bool tryClose(std::string& reason);
 

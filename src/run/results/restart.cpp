@@ -147,7 +147,7 @@ RestartFiles restartFiles(const std::string& filePrefix, const ResultFileNames& 
   return {runFilePath(filePrefix, names.results),         runFilePath(filePrefix, names.restart),
           runFilePath(filePrefix, names.simulatedValues), runFilePath(filePrefix, names.record),
           runFilePath(filePrefix, names.failures),        runFilePath(filePrefix, names.pairs),
-          runFilePath(filePrefix, names.checksums)};
+          runFilePath(filePrefix, names.checksums),       runFilePath(filePrefix, names.unkept)};
 }
 
 std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunConfig& config,

@@ -25,6 +25,7 @@ struct RestartFiles {
   std::string failures;
   std::string pairs;
   std::string checksums;  ///< of the rows of the results
+  std::string unkept;
 };
 
 /// The paths of these files; `filePrefix` is folder and name of the setup.

@@ -90,6 +90,7 @@ std::string shownSection(const SettingIndex& index, std::string_view section) {
       const auto name = index.find({section.substr(0, end), keyword});
       if (itemPattern(part) == part || name == index.end()) continue;
       const std::string_view quoted = name->second->value;
+      if (quoted.size() < 2) continue;  // of a file that was changed
       return fmt::format("{}{} ({})", part, section.substr(end), quoted.substr(1, quoted.size() - 2));
     }
     start = end + 1;

@@ -67,6 +67,7 @@ RunResults::RunResults(const RunConfig& config, const SearchSpace& space, const 
       failedRuns_({pathBeside(filePrefix, run_files::kFailedRuns), files_.failures}, config.setupName, space.names,
                   tableHead_),
       pairs_(files_.pairs, tableHead_),
+      unkeptFiles_(files_.unkept, tableHead_),
       record_(files_.record, tableHead_) {
   if (config.task && config.restart != RestartMode::startAfresh) {
     auto record = record_.readEarlier();
@@ -90,7 +91,8 @@ void RunResults::open(const RunConfig& config, std::span<const ObservedSeries> o
   if (config.keepsSimulatedValues() || config.usesExactMeasures()) {
     const SeriesPrecision precision = config.task->keptPrecision();
     simulatedValues_.emplace(files_.simulatedValues, simulatedValueCount(observed, precision), precision,
-                             config.usesExactMeasures() ? config.measures.size() : 0);
+                             config.usesExactMeasures() ? config.measures.size() : 0,
+                             config.task->readsSimulatedValues());
   }
   if (earlierRun_) {
     goOn(config, aggregator, log);
@@ -109,17 +111,25 @@ std::vector<std::string> RunResults::bandPaths(const RunConfig& config) const {
 }
 
 std::vector<std::string> RunResults::pathsBesideResults() const {
-  std::vector<std::string> paths{files_.record, files_.failures, files_.pairs, files_.checksums};
+  std::vector<std::string> paths{files_.record, files_.failures, files_.pairs, files_.checksums, files_.unkept};
   for (const RunFile& table : names_.tables) paths.push_back(runFilePath(filePrefix_, table));
   return paths;
 }
 
 void RunResults::requireReplaceableFiles(const RunConfig& config) const {
   if (!config.task) return;
-  std::vector<RunFile> files{names_.results,          names_.restart,           names_.simulatedValues,
-                             names_.record,           names_.failures,          names_.pairs,
-                             names_.checksums,        run_files::kSeries,       run_files::kReport,
-                             run_files::kSavedFolder, run_files::kOwnFailedRuns};
+  std::vector<RunFile> files{names_.results,
+                             names_.restart,
+                             names_.simulatedValues,
+                             names_.record,
+                             names_.failures,
+                             names_.pairs,
+                             names_.checksums,
+                             run_files::kSeries,
+                             run_files::kReport,
+                             run_files::kSavedFolder,
+                             run_files::kOwnFailedRuns,
+                             names_.unkept};
   files.insert(files.end(), names_.tables.begin(), names_.tables.end());
   for (const RunFile& file : files) requireReplaceable(runFilePath(filePrefix_, file), file);
   requireReplaceable(pathBeside(filePrefix_, run_files::kFailedRuns), run_files::kFailedRuns);
@@ -276,7 +286,20 @@ void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggreg
         withoutValues, files_.simulatedValues));
   }
   log.line(fmt::format("Restart: {} evaluations are taken from {}", records.size(), files_.results));
+  std::set<std::string> names;
+  for (const SavedOutputFile& file : config.savedOutputFiles) {
+    names.emplace(trimTrailing(file.fileName).substr(config.baseFolder.size()));
+  }
+  std::erase_if(succeeded, [&records](int number) { return !records.contains(number); });
+  std::set<int> again = unkeptFiles_.goOn(succeeded, names);
+  if (!again.empty()) {
+    log.line(
+        fmt::format("Restart: model runs that are made again for output files that could not be kept, see {}: {}; the "
+                    "results stay as they are",
+                    fileNameOf(files_.unkept), again.size()));
+  }
   earlierEvaluations_.emplace(space_, aggregator, std::move(records));
+  earlierEvaluations_->runAgain(std::move(again));
 }
 
 }  // namespace mirevo

@@ -19,6 +19,7 @@
 #include "run/results/result_file.h"
 #include "run/results/run_record_file.h"
 #include "run/results/simulated_values_file.h"
+#include "run/results/unkept_files.h"
 #include "run/setup/run_config.h"
 
 namespace mirevo {
@@ -53,6 +54,7 @@ class RunResults final {
   ResultFile& table() { return table_; }
   FailedRunFile& failedRuns() { return failedRuns_; }
   PairsFile& pairs() { return pairs_; }
+  UnkeptFiles& unkeptFiles() { return unkeptFiles_; }
   RunRecordFile& record() { return record_; }
   /// nullptr where the task does not work with simulated values.
   SimulatedValuesFile* simulatedValues() { return simulatedValues_ ? &*simulatedValues_ : nullptr; }
@@ -85,6 +87,7 @@ class RunResults final {
   FileLock failedRunsLock_;  ///< on `calSimErr.dat`
   FailedRunFile failedRuns_;
   PairsFile pairs_;
+  UnkeptFiles unkeptFiles_;
   RunRecordFile record_;
   std::optional<SimulatedValuesFile> simulatedValues_;
   std::optional<EarlierEvaluations> earlierEvaluations_;

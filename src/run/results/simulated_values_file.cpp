@@ -55,14 +55,19 @@ std::uint64_t checksumWithRow(std::string_view content, std::span<const double> 
 }  // namespace
 
 SimulatedValuesFile::SimulatedValuesFile(std::string path, std::size_t valueCount, SeriesPrecision precision,
-                                         std::size_t exactMeasureCount)
-    : path_(std::move(path)), valueCount_(valueCount), precision_(precision), exactMeasureCount_(exactMeasureCount) {}
+                                         std::size_t exactMeasureCount, bool isReadBack)
+    : path_(std::move(path)),
+      valueCount_(valueCount),
+      precision_(precision),
+      exactMeasureCount_(exactMeasureCount),
+      isReadBack_(isReadBack) {}
 
 std::string SimulatedValuesFile::head() const {
   return headOf(kMarks, precision_, recordedCount());
 }
 
 void SimulatedValuesFile::create() {
+  offsets_.clear();
   file_.open(path_);
   file_.append(head());
 }
@@ -75,43 +80,104 @@ void SimulatedValuesFile::add(std::span<const double> parameterValues, const Eva
     bytes.append(reinterpret_cast<const char*>(values->data()), values->size() * sizeof(double));
   }
   appendBytes(bytes, checksumWithRow(bytes, parameterValues, result.measureValues));
+  const std::int64_t offset = file_.size();
   file_.append(bytes);
+  noteOffset(result.number, offset);
+}
+
+/// Replaces a file of an earlier version, whose checksums do not depend on the rows.
+void SimulatedValuesFile::addRowsToChecksums(const std::map<std::int64_t, const ResultRow*>& rows) const {
+  const std::string earlierHead = headOf(kMarksWithoutRow, precision_, recordedCount());
+  if (readFileIfThere(path_, earlierHead.size()) != earlierHead) return;
+  const std::string content = readFileIfThere(path_).value_or("");
+  std::string bytes = head();
+  std::string_view rest = std::string_view(content).substr(earlierHead.size());
+  for (; rest.size() >= recordLength(); rest.remove_prefix(recordLength())) {
+    const std::string_view record = rest.substr(0, contentLength());
+    const auto row = rows.find(numberAt<std::int64_t>(record, 0));
+    if (row == rows.end() || checksumOf(record) != numberAt<std::uint64_t>(rest, contentLength())) continue;
+    bytes += record;
+    appendBytes(bytes, checksumWithRow(record, row->second->parameters, row->second->measures));
+  }
+  std::string reason;
+  if (!replaceFile(path_, bytes, reason)) fatalError("Error: Unable to write to " + path_, reason);
 }
 
 std::map<int, KeptValues> SimulatedValuesFile::takeUp(std::span<const ResultRow> rows) {
-  std::string reason;
-  const std::string content = readFileIfThere(path_).value_or("");
-  std::string kept = head();
-  std::map<int, KeptValues> found;
   std::map<std::int64_t, const ResultRow*> succeeded;
   for (const ResultRow& row : rows) {
     if (row.ok) succeeded.emplace(row.number, &row);
   }
-  const std::size_t contentLength = sizeof(std::int64_t) + recordedCount() * sizeof(double);
-  const std::size_t recordLength = contentLength + sizeof(std::uint64_t);
-  std::string_view rest = content;
-  const bool hasRow = rest.starts_with(kept);
-  if (!hasRow && !rest.starts_with(headOf(kMarksWithoutRow, precision_, recordedCount()))) rest = {};
-  if (!rest.empty()) rest.remove_prefix(kept.size());
-  for (; rest.size() >= recordLength; rest.remove_prefix(recordLength)) {
-    const std::string_view record = rest.substr(0, contentLength);
+  addRowsToChecksums(succeeded);
+  const std::string expected = head();
+  if (readFileIfThere(path_, expected.size()) != expected) {
+    create();
+    return {};
+  }
+  file_.openToContinue(path_);
+  offsets_.clear();
+  std::map<int, KeptValues> found;
+  std::string record(recordLength(), '\0');
+  auto offset = static_cast<std::int64_t>(expected.size());
+  const auto length = static_cast<std::int64_t>(record.size());
+  for (; offset + length <= file_.size(); offset += length) {
+    read(offset, record.data(), record.size());
+    const std::string_view content = std::string_view(record).substr(0, contentLength());
     const auto row = succeeded.find(numberAt<std::int64_t>(record, 0));
-    if (row == succeeded.end()) continue;
-    const std::uint64_t checksum = checksumWithRow(record, row->second->parameters, row->second->measures);
-    if (numberAt<std::uint64_t>(rest, contentLength) != (hasRow ? checksum : checksumOf(record))) continue;
+    if (row == succeeded.end() || checksumWithRow(content, row->second->parameters, row->second->measures) !=
+                                      numberAt<std::uint64_t>(record, contentLength())) {
+      continue;
+    }
+    const int number = row->second->number;
     KeptValues values{std::vector<double>(valueCount_), std::vector<double>(exactMeasureCount_)};
     const char* from = record.data() + sizeof(std::int64_t);
     for (std::vector<double>* const part : {&values.simulatedValues, &values.exactMeasures}) {
       if (!part->empty()) std::memcpy(part->data(), from, part->size() * sizeof(double));
       from += part->size() * sizeof(double);
     }
-    if (!found.emplace(row->second->number, std::move(values)).second) continue;
-    kept += record;
-    appendBytes(kept, checksum);
+    if (isReadBack_) values.simulatedValues = std::vector<double>();
+    found.insert_or_assign(number, std::move(values));
+    noteOffset(number, offset);
   }
-  if (kept != content && !replaceFile(path_, kept, reason)) fatalError("Error: Unable to write to " + path_, reason);
-  file_.openToContinue(path_);
+  if (offset < file_.size()) file_.cutTo(offset);
   return found;
+}
+
+void SimulatedValuesFile::noteOffset(int number, std::int64_t offset) {
+  const auto place = static_cast<std::size_t>(number);
+  if (offsets_.size() < place) offsets_.resize(place);
+  offsets_[place - 1] = offset;
+}
+
+std::int64_t SimulatedValuesFile::offsetOf(int number) const {
+  const std::int64_t offset = offsets_.at(static_cast<std::size_t>(number) - 1);
+  assert(offset > 0);
+  return offset;
+}
+
+void SimulatedValuesFile::read(std::int64_t offset, char* bytes, std::size_t size) const {
+  std::string reason;
+  if (!file_.tryRead(offset, bytes, size, reason)) fatalError("Error: Unable to read " + path_, reason);
+}
+
+std::vector<double> SimulatedValuesFile::valuesOf(int number) const {
+  return columns(std::span(&number, 1), 0, valueCount_);
+}
+
+std::vector<double> SimulatedValuesFile::columns(std::span<const int> numbers, std::size_t first,
+                                                 std::size_t count) const {
+  std::vector<double> values(numbers.size() * count);
+  std::vector<double> ofOne(count);
+  for (std::size_t i = 0; i < numbers.size(); ++i) {
+    const std::int64_t offset = offsetOf(numbers[i]);
+    std::int64_t number = 0;
+    read(offset, reinterpret_cast<char*>(&number), sizeof number);
+    if (number != numbers[i]) fatalError("Error: Unable to read " + path_, "another program has changed it");
+    const auto start = offset + static_cast<std::int64_t>(sizeof number + first * sizeof(double));
+    read(start, reinterpret_cast<char*>(ofOne.data()), count * sizeof(double));
+    for (std::size_t j = 0; j < count; ++j) values[j * numbers.size() + i] = ofOne[j];
+  }
+  return values;
 }
 
 }  // namespace mirevo

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <map>
 #include <span>
 #include <string>
@@ -24,23 +25,31 @@ struct KeptValues {
 /// repeat. Binary, one record per evaluation: its number, the values, the measures, a checksum of all and of the
 /// parameter values and measures in its row. Not meant for
 /// other programs: on a machine with another number format the file counts as damaged, and the evaluations are
-/// repeated.
+/// repeated. Of several records of an evaluation the last counts.
 class SimulatedValuesFile final {
  public:
-  /// `valueCount`: simulated values of one evaluation.
+  /// `valueCount`: simulated values of one evaluation. `isReadBack`: the task reads them with valuesOf() and columns(),
+  /// so that no one keeps them in memory.
   SimulatedValuesFile(std::string path, std::size_t valueCount, SeriesPrecision precision = SeriesPrecision::single,
-                      std::size_t exactMeasureCount = 0);
+                      std::size_t exactMeasureCount = 0, bool isReadBack = false);
 
   /// Creates the file, replacing an existing one. Throws FatalError.
   void create();
-  /// Continues the file of an interrupted run: keeps the records of the successful evaluations among `rows`, appends to
-  /// them from now on, and returns their values by number. Records that are cut off, damaged or of other evaluations,
-  /// perhaps of another run, are dropped, and so are all of a file of another precision. Throws FatalError when the
-  /// file cannot be written.
+  /// Continues the file of an interrupted run: appends to its records from now on, and returns what it has of the
+  /// successful evaluations among `rows`; the simulated values are left out if they are read back. Records that are
+  /// damaged or of other evaluations, perhaps of another run, are passed over, one that is cut off is removed, and so
+  /// are all of a file of another precision. Throws FatalError when the file cannot be read or written.
   std::map<int, KeptValues> takeUp(std::span<const ResultRow> rows);
 
   /// Writes the values of a successful evaluation; `parameterValues` as in its row. Throws FatalError when that fails.
   void add(std::span<const double> parameterValues, const EvaluationResult& result);
+
+  bool isReadBack() const { return isReadBack_; }
+  /// The simulated values of an evaluation that was added or taken up. Throws FatalError if they cannot be read.
+  std::vector<double> valuesOf(int number) const;
+  /// Of such evaluations the simulated values from index `first` on, `count` of each; those with the same index side
+  /// by side, in the order of `numbers`. Throws FatalError if they cannot be read.
+  std::vector<double> columns(std::span<const int> numbers, std::size_t first, std::size_t count) const;
   /// Throws FatalError if not everything written has reached the file.
   void close() { file_.close(); }
 
@@ -49,12 +58,20 @@ class SimulatedValuesFile final {
  private:
   std::string head() const;
   std::size_t recordedCount() const { return valueCount_ + exactMeasureCount_; }
+  std::size_t contentLength() const { return sizeof(std::int64_t) + recordedCount() * sizeof(double); }
+  std::size_t recordLength() const { return contentLength() + sizeof(std::uint64_t); }
+  void addRowsToChecksums(const std::map<std::int64_t, const ResultRow*>& rows) const;
+  void read(std::int64_t offset, char* bytes, std::size_t size) const;
+  void noteOffset(int number, std::int64_t offset);
+  std::int64_t offsetOf(int number) const;
 
   std::string path_;
   std::size_t valueCount_;
   SeriesPrecision precision_;
   std::size_t exactMeasureCount_;
+  bool isReadBack_;
   RecordFile file_;
+  std::vector<std::int64_t> offsets_;  ///< of the record of each evaluation, from No. 1 on; 0: none
 };
 
 }  // namespace mirevo

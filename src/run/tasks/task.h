@@ -60,7 +60,7 @@ struct TaskContext {
   /// Called with what a search has found, before the final model run repeats its best parameter set. May be empty.
   std::function<void(const SearchSummary&)> searchEnded = {};
   std::string filePrefix = {};  ///< folder and name of the setup: the beginning of the paths of the run's files
-  /// The observations whose simulated values the results hold; needed if the task keepsSimulatedValues().
+  /// The observations whose simulated values are kept; needed if the task keepsSimulatedValues().
   std::span<const ObservedSeries> observedSeries = {};
   ParameterFields fields = {};
   /// The aggregate of the objective functions' values. May be empty.
@@ -68,6 +68,9 @@ struct TaskContext {
   Feasibility feasibility = {};  ///< which sets can be run, of a model with constraints or equations
   /// Shows the user a warning that the log receives as well. May be empty.
   std::function<void(std::string_view)> warnUser = {};
+  /// SimulatedValuesFile::columns(), if the task readsSimulatedValues().
+  std::function<std::vector<double>(std::span<const int> numbers, std::size_t first, std::size_t count)>
+      simulatedColumns = {};
 };
 
 /// A file beside the results.
@@ -134,8 +137,10 @@ class Task {
   virtual bool hasFinalRun() const { return false; }
   /// Whether the results depend on the random seed.
   virtual bool drawsRandomNumbers() const { return false; }
-  /// Whether it uses the simulated values at the observation times, which the results then must hold.
+  /// Whether it uses the simulated values at the observation times.
   virtual bool keepsSimulatedValues() const { return false; }
+  /// Whether it reads them from disk when all evaluations have ended; results then do not hold them.
+  virtual bool readsSimulatedValues() const { return false; }
   virtual SeriesPrecision keptPrecision() const { return SeriesPrecision::single; }
   /// Whether it uses the output measures in 64 bits, which the results then must hold.
   virtual bool usesExactMeasures() const { return false; }

@@ -13,10 +13,16 @@ namespace {
 /// Adds the band of each series to `files` and returns one line on each for the report.
 std::vector<std::string> reportBands(const TaskContext& context, std::span<const EvaluationResult> results,
                                      std::vector<TaskFile>& files) {
+  std::vector<int> numbers;
+  for (const EvaluationResult& result : results) {
+    if (result.ok()) numbers.push_back(result.number);
+  }
   std::vector<std::string> lines;
   std::size_t first = 0;
   for (const ObservedSeries& observed : context.observedSeries) {
-    const SeriesBand band = seriesBand(observed.values, results, first);
+    const SeriesBand band = seriesBand(observed.values, numbers.size(), [&](std::size_t index, std::size_t count) {
+      return context.simulatedColumns(numbers, first + index, count);
+    });
     first += observed.values.size();
     const std::string& name = context.measures[observed.measure].name;
     files.push_back({runFilePath(context.filePrefix, run_files::kBand, static_cast<int>(observed.measure) + 1),

@@ -18,6 +18,7 @@ class UncertaintyTask final : public Task {
   int plannedEvaluations() const override { return settings.sampleSize; }
   bool drawsRandomNumbers() const override { return true; }
   bool keepsSimulatedValues() const override { return true; }
+  bool readsSimulatedValues() const override { return true; }
   void requireSets(const SearchSpace& space, const Feasibility& feasibility) const override;
   TaskOutcome run(const TaskContext& context) override;
   std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const override;

@@ -59,13 +59,19 @@ TEST(SampleCorrelation, OfMoreThanTenColumnsIsToldByItsLargestPairs) {
 }
 
 TEST(SeriesBand, HasTheQuantilesOfWhatSucceededAndCountsTheObservationsInside) {
-  std::vector<EvaluationResult> results(102);
-  for (std::size_t i = 0; i < results.size(); ++i) {
-    if (i == 7) continue;                                                          // failed
-    const double value = static_cast<double>((37 * (i - (i > 7 ? 1 : 0))) % 101);  // 0 to 100, shuffled
-    results[i].simulatedValues = {-1.0, value, value, i == 0 ? NAN : value, NAN, -value};
+  std::vector<double> columns;
+  for (std::size_t observation = 0; observation < 5; ++observation) {
+    for (std::size_t i = 0; i < 101; ++i) {
+      const auto value = static_cast<double>((37 * i) % 101);  // 0 to 100, shuffled
+      const bool isMissing = observation == 3 || (observation == 2 && i == 0);
+      columns.push_back(isMissing ? NAN : observation == 4 ? -value : value);
+    }
   }
-  const SeriesBand band = seriesBand(std::vector{5.0, 4.9, 50.0, 1.0, -95.0}, results, 1);
+  const auto read = [&](std::size_t first, std::size_t count) {
+    const auto from = columns.begin() + static_cast<std::ptrdiff_t>(101 * first);
+    return std::vector(from, from + static_cast<std::ptrdiff_t>(101 * count));
+  };
+  const SeriesBand band = seriesBand(std::vector{5.0, 4.9, 50.0, 1.0, -95.0}, 101, read);
   EXPECT_DOUBLE_EQ(band.lower[0], 5.0);
   EXPECT_DOUBLE_EQ(band.median[0], 50.0);
   EXPECT_DOUBLE_EQ(band.upper[0], 95.0);
@@ -76,9 +82,9 @@ TEST(SeriesBand, HasTheQuantilesOfWhatSucceededAndCountsTheObservationsInside) {
   EXPECT_EQ(fewerRunsText(band),
             "at 1 of 4 observations the quantiles are of fewer runs than at the others, of 100 to 101: runs have no "
             "value there");
-  EXPECT_EQ(fewerRunsText(seriesBand(std::vector{5.0}, results, 1)), "");
+  EXPECT_EQ(fewerRunsText(seriesBand(std::vector{5.0}, 101, read)), "");
   EXPECT_EQ(band.shareInside, 0.75);
-  EXPECT_TRUE(std::isnan(seriesBand(std::vector{1.0}, {}, 0).shareInside));
+  EXPECT_TRUE(std::isnan(seriesBand(std::vector{1.0}, 0, [](auto...) { return std::vector<double>(); }).shareInside));
 }
 
 }  // namespace

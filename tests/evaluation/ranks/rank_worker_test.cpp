@@ -172,6 +172,11 @@ TEST(RankMessages, ContentThatWasCutOrHasMoreIsRefused) {
                               {"made anew"}};
   const std::string content = encode(message);
   EXPECT_EQ(encode(decodeResult(content)), content);
+  for (const int kind : {-1, 13}) {
+    ResultMessage other = message;
+    other.result.failure->kind = static_cast<EvaluationFailure::Kind>(kind);
+    EXPECT_THROW(decodeResult(encode(other)), FatalError) << kind;
+  }
   for (std::size_t length = 0; length < content.size(); ++length) {
     EXPECT_THROW(decodeResult(content.substr(0, length)), FatalError) << length;
   }

@@ -11,6 +11,7 @@
 #include "run/results/failed_run_file.h"
 #include "run/results/restart_settings.h"
 #include "run/results/simulated_values_file.h"
+#include "run/results/unkept_files.h"
 #include "run/setup_fixture.h"
 #include "temporary_folder.h"
 
@@ -59,6 +60,17 @@ TEST_F(RestartSettingsTest, AKeywordThatAnEarlierVersionDidNotKnowWorkedAsItsDef
   RestartSettings then = now;
   EXPECT_GT(std::erase_if(then.settings, std::mem_fn(&ResultSetting::isDefault)), 0U);
   EXPECT_THAT(changedSettings(then, now), IsEmpty());
+}
+
+TEST_F(RestartSettingsTest, ANameThatIsCutOffIsNotShown) {
+  RestartSettings then = restartSettings(read());
+  RestartSettings now = then;
+  for (ResultSetting& setting : then.settings) {
+    if (setting.keyword == "Parameter_Name") setting.value.clear();
+  }
+  std::erase_if(now.settings, [](const ResultSetting& setting) { return setting.keyword == "Upper_Bound"; });
+  EXPECT_THAT(changedSettings(then, now),
+              testing::Contains("Upper_Bound of MODEL_PARAMETERS/PARAMETER_1: 900 then, absent now"));
 }
 
 TEST_F(RestartSettingsTest, FilesAreHeldAgainstTheirContent) {
@@ -228,7 +240,7 @@ TEST(SimulatedValuesFile, KeepsWholeRecordsOfTheEvaluationsThatCount) {
     return rows;
   };
   const auto fileOf = [&](SeriesPrecision precision = SeriesPrecision::single) {
-    return SimulatedValuesFile(folder / "v.bin", 1, precision, 1);
+    return SimulatedValuesFile(folder / "v.bin", 1, precision, 1, true);
   };
   SimulatedValuesFile file = fileOf();
   file.create();
@@ -244,22 +256,48 @@ TEST(SimulatedValuesFile, KeepsWholeRecordsOfTheEvaluationsThatCount) {
     const std::size_t records = length < kHead ? 0 : (length - kHead) / kRecord;
     ASSERT_EQ(found.size(), std::min<std::size_t>(records, 2)) << length;
     for (const auto& [number, values] : found) {
-      EXPECT_THAT(values.simulatedValues, ElementsAre(0.1 * number));
+      EXPECT_THAT(values.simulatedValues, IsEmpty());
+      EXPECT_THAT(cut.valuesOf(number), ElementsAre(0.1 * number));
       EXPECT_THAT(values.exactMeasures, ElementsAre(-1.0 * number));
     }
     add(cut, 2);
-    EXPECT_EQ(folder.read("v.bin").size(), kHead + (found.size() + 1) * kRecord);
+    EXPECT_EQ(folder.read("v.bin").size(), kHead + (records + 1) * kRecord);
+    if (records == 0) continue;
+    EXPECT_THAT(cut.columns(std::vector{2, 3}, 0, 1), ElementsAre(0.2, 0.1 * 3));
   }
   std::string damaged = whole;
   damaged[kHead + kRecord + 10] ^= 1;
-  folder.write("v.bin", damaged);
   const std::vector<ResultRow> rows = rowsOf({1, 2, 3});
+  folder.write("v.bin", whole.substr(0, kHead + kRecord) + damaged.substr(kHead));
+  SimulatedValuesFile again = fileOf();
+  EXPECT_EQ(again.takeUp(rowsOf({3})).size(), 1U);
+  EXPECT_THAT(again.valuesOf(3), ElementsAre(0.1 * 3));
+  folder.write("v.bin", damaged);  // No. 1 is now where the second record of No. 3 was
+  EXPECT_THAT(refusalOf([&] { again.valuesOf(3); }), HasSubstr("another program has changed it"));
   EXPECT_THAT(fileOf().takeUp(rows), ElementsAre(testing::Key(2), testing::Key(3)));
   EXPECT_THAT(SimulatedValuesFile(folder / "v.bin", 3).takeUp(rows), IsEmpty()) << "of other series";
   folder.write("v.bin", whole);
   EXPECT_THAT(fileOf().takeUp(rowsOf({1, 2, 3}, 2.25, 1.75)), ElementsAre(testing::Key(1))) << "of another run";
   folder.write("v.bin", whole);
   EXPECT_THAT(fileOf(SeriesPrecision::exact).takeUp(rows), IsEmpty());
+}
+
+TEST(UnkeptFiles, AreThoseThatNoLaterRunHasKept) {
+  const TemporaryFolder folder;
+  UnkeptFiles first(folder / "u.dat", {"head"});
+  first.add(3, std::vector<UnkeptFile>{{"/a.csv", "full"}, {"/b.csv", "full"}});
+  first.add(1, std::vector<UnkeptFile>{{"/a.csv", "full"}});
+  first.add(5, std::vector<UnkeptFile>{{"/a.csv", "full"}});
+  first.add(1, {});
+  first.add(3, std::vector<UnkeptFile>{{"/b.csv", "late"}});
+  const std::string text = folder.read("u.dat");
+  EXPECT_THAT(text, HasSubstr("\n3\t/b.csv\tlate\n"));
+  EXPECT_EQ(UnkeptFiles(folder / "u.dat", {"head"}).goOn({1, 3, 4}, {"/a.csv", "/b.csv"}), std::set{3});
+  EXPECT_EQ(folder.read("u.dat"), "# head\nEvaluation\tFile\tReason\n3\t/b.csv\tlate\n");
+  folder.write("u.dat", text);
+  EXPECT_EQ(UnkeptFiles(folder / "u.dat", {}).goOn({1, 3, 5}, {"/a.csv"}), std::set{5});
+  EXPECT_THAT(UnkeptFiles(folder / "none.dat", {}).goOn({1}, {"/a.csv"}), IsEmpty());
+  EXPECT_FALSE(folder.exists("none.dat"));
 }
 
 TEST(FailedRunFile, IsContinuedWithTheFailuresThatCount) {
