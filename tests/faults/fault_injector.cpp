@@ -1,5 +1,6 @@
 // A library to be loaded before all others (LD_PRELOAD) that makes one chosen system call of the program fail, as a
-// full disk, a missing permission or exhausted descriptors would, and that can let the clock run backwards.
+// full disk, a missing permission or exhausted descriptors would, that can let the clock run backwards or differ from
+// those of other machines, and that can make files slow.
 // Environment:
 //
 //   FAULT_PROGRAM  the program file that it works in; the processes that this starts are left alone
@@ -13,6 +14,8 @@
 //                  when the call is met.
 //   FAULT_KILL     the program is killed (SIGKILL) at its call of this number, from 1, before it is made
 //   FAULT_OLD      a kernel that has no pidfds and no close_range
+//   FAULT_SKEW     that many seconds are added to the time of day
+//   FAULT_DELAY    that many microseconds each call in the folder takes longer
 //   FAULT_CLOCK    that many seconds are taken from the time of day, once more with each look at it
 //
 // The calls go to the C library's own functions. The library keeps no open file and allocates nothing, so that the
@@ -57,6 +60,8 @@ struct Settings {
   long killAt = 0;
   long clockStep = 0;
   bool isOld = false;
+  long clockSkew = 0;
+  long delay = 0;
 };
 Settings settings;
 long callsMade = 0;
@@ -111,6 +116,8 @@ __attribute__((constructor)) void initialise() {
   if (const char* kill = std::getenv("FAULT_KILL")) settings.killAt = std::atol(kill);
   settings.isOld = std::getenv("FAULT_OLD") != nullptr;
   if (const char* clock = std::getenv("FAULT_CLOCK")) settings.clockStep = std::atol(clock);
+  if (const char* skew = std::getenv("FAULT_SKEW")) settings.clockSkew = std::atol(skew);
+  if (const char* delay = std::getenv("FAULT_DELAY")) settings.delay = std::atol(delay);
   ::unsetenv("LD_PRELOAD");  // the model's processes start without it
   settings.active = true;
 }
@@ -139,6 +146,7 @@ bool fails(const char* call, const char* path) {
   if (++callsMade == settings.killAt) ::raise(SIGKILL);
   const int saved = errno;
   appendToRecord(call, relative);
+  if (settings.delay > 0) ::usleep(static_cast<useconds_t>(settings.delay));
   errno = saved;
   if (std::string_view(call) != settings.call.data() || std::string_view(relative) != settings.path.data())
     return false;
@@ -176,7 +184,7 @@ const char* openName(int flags) {
 }
 
 long shiftOfClock() {
-  return settings.active ? settings.clockStep * ++clockLooks : 0;
+  return settings.active ? settings.clockStep * ++clockLooks - settings.clockSkew : 0;
 }
 
 int openWith(int (*real)(const char*, int, ...), const char* path, int flags, va_list arguments) {
@@ -211,6 +219,8 @@ OPEN_MAY_FAIL(open)
 OPEN_MAY_FAIL(open64)
 MAY_FAIL(ssize_t, read, (int descriptor, void* bytes, size_t count), (descriptor, bytes, count),
          failsOn("read", descriptor))
+MAY_FAIL(ssize_t, pread, (int descriptor, void* bytes, size_t count, off_t offset), (descriptor, bytes, count, offset),
+         failsOn("read-at", descriptor))
 MAY_FAIL(int, fsync, (int descriptor), (descriptor), failsOn("fsync", descriptor))
 MAY_FAIL(int, ftruncate, (int descriptor, off_t length) noexcept, (descriptor, length), failsOn("truncate", descriptor))
 MAY_FAIL(int, fchmod, (int descriptor, mode_t mode) noexcept, (descriptor, mode), failsOn("chmod", descriptor))

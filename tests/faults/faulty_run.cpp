@@ -58,7 +58,7 @@ std::map<int, std::string> rowsOf(const std::string& text, std::string& torn) {
 
 FaultyRun::FaultyRun(const RunSettings& settings, const std::string& script)
     : restarts_(settings.restart != 0), resultFileName_(settings.resultFile()), marker_(folder_.path()) {
-  folder_.useScript(script);
+  folder_.useScript("test -s data/table.txt || exit 9\n" + script);
   folder_.write("model/data/table.txt", std::string(20'000, 'x'));
   fs::create_symlink("data/table.txt", folder_ / "model/link");
   folder_.writeSetup(settings);

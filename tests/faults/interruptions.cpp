@@ -216,6 +216,28 @@ void tryClocks(FaultReport& report) {
   }
 }
 
+/// Killed on a machine whose clock is an hour off, and continued on one whose is right; the file system is slow.
+void tryNodes(FaultReport& report) {
+  for (const RunSettings& settings : {kRuns[0], kRuns[3], kRuns[6]}) {
+    for (const char* skew : {"3600", "-3600"}) {
+      FaultyRun run(restarting(settings));
+      const TemporaryFolder records;
+      run.makeReference(run.injection({{"FAULT_RECORD", records / "calls"}}));
+      const std::string calls = records.read("calls");
+      const auto half = std::count(calls.begin(), calls.end(), '\n') / 2;
+      run.reset();
+      run.run(run.injection({{"FAULT_SKEW", skew}, {"FAULT_DELAY", "500"}, {"FAULT_KILL", std::to_string(half)}}));
+      auto problems = run.checkProcesses();
+      run.startFromHere();
+      const ProgramResult result = run.run(run.injection({{"FAULT_DELAY", "500"}}));
+      for (const auto& more : {run.check(result, {.mayPassSilently = true, .exitCode = 0}), run.checkOutputs()}) {
+        problems.insert(problems.end(), more.begin(), more.end());
+      }
+      report.tried("another node's clock", fmt::format("{}, {} s off", nameOf(settings), skew), problems);
+    }
+  }
+}
+
 }  // namespace
 
 void tryInterruptions(bool isLong, FaultReport& report) {
@@ -232,6 +254,7 @@ void tryInterruptions(bool isLong, FaultReport& report) {
   }
   tryStops(isLong ? 40 : 3, report);
   tryClocks(report);
+  tryNodes(report);
 }
 
 }  // namespace mirevo::testing

@@ -73,7 +73,8 @@ std::string readTail(int fd) {
   const off_t start = std::max<off_t>(0, status.st_size - static_cast<off_t>(kOutputTailBytes));
   std::string text(static_cast<std::size_t>(status.st_size - start), '\0');
   const ssize_t length = text.empty() ? 0 : ::pread(fd, text.data(), text.size(), start);
-  text.resize(static_cast<std::size_t>(std::max<ssize_t>(length, 0)));
+  if (length < 0) return fmt::format("(its output cannot be read: {})", std::strerror(errno));
+  text.resize(static_cast<std::size_t>(length));
   return text;
 }
 

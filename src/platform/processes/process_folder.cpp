@@ -61,6 +61,7 @@ std::optional<std::vector<std::string>> namesIn(const std::string& path) {
 std::optional<struct stat> statusOf(const std::string& path) {
   struct stat status {};
   if (::lstat(path.c_str(), &status) == 0) return status;
+  if (errno == ESTALE && ::lstat(path.c_str(), &status) == 0) return status;  // another took its place
   if (!hasVanished(errno)) fail("look at", path, errno);
   return std::nullopt;
 }
@@ -79,9 +80,10 @@ void copyTimes(int to, const struct stat& status) {
   ::futimens(to, times.data());  // a copy with other times is still a copy
 }
 
-void copyFile(const std::string& source, const std::string& target, const struct stat& status) {
+/// False if the file has vanished.
+bool isFileCopied(const std::string& source, const std::string& target, const struct stat& status) {
   const Descriptor from(::open(source.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW));
-  if (from.get() < 0 && hasVanished(errno)) return;
+  if (from.get() < 0 && hasVanished(errno)) return false;
   if (from.get() < 0) fail("read", source, errno);
   Descriptor to(::open(target.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, S_IRUSR | S_IWUSR));
   if (to.get() < 0) fail("create", target, errno);
@@ -89,11 +91,19 @@ void copyFile(const std::string& source, const std::string& target, const struct
     const int error = errno;
     if (!hasVanished(error)) fail("write", target, error);
     ::unlink(target.c_str());  // removed on another machine that has this disk
-    return;
+    return false;
   }
   if (::fchmod(to.get(), status.st_mode & 07777) != 0) fail("set the mode of", target, errno);
   copyTimes(to.get(), status);
   if (!to.close()) fail("write", target, errno);
+  return true;
+}
+
+void copyFile(const std::string& source, const std::string& target, const struct stat& status) {
+  if (isFileCopied(source, target, status)) return;
+  // One that another has replaced is there again under its name; a model must not lack it.
+  const auto now = statusOf(source);
+  if (now && S_ISREG(now->st_mode)) isFileCopied(source, target, *now);
 }
 
 /// Whether a relative link in a folder, `below` the root, leads to its target without leaving the root.

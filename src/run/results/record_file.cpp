@@ -130,9 +130,12 @@ void RecordFile::close() {
 
 bool RecordFile::tryClose(std::string& reason) {
   const int descriptor = std::exchange(descriptor_, -1);
-  if (descriptor < 0 || ::close(descriptor) == 0 || errno == EINTR) return true;
-  reason = std::strerror(errno);
-  return false;
+  if (descriptor < 0) return true;
+  // What the system has taken may still fail on its way to the disk, and only this call tells of it.
+  const int lost = ::fsync(descriptor) == 0 || errno == EINVAL || errno == EINTR ? 0 : errno;
+  const int error = ::close(descriptor) == 0 || errno == EINTR ? lost : errno;
+  if (error != 0) reason = std::strerror(error);
+  return error == 0;
 }
 
 std::vector<NumberedEntry> numberedEntries(const std::string& prefix, std::string_view extension) {

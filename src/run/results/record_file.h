@@ -34,7 +34,7 @@ class RecordFile final {
   /// throwing.
   bool tryAppend(std::string_view record, std::string& reason);
 
-  /// Throws FatalError with the system's reason if not everything written has reached the file.
+  /// Throws FatalError with the system's reason if not everything written has reached the disk.
   void close();
   /// Reads bytes written before, `size` of them from `offset` on. False, with the reason, if that fails.
   bool tryRead(std::int64_t offset, char* bytes, std::size_t size, std::string& reason) const;

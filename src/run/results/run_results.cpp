@@ -151,6 +151,7 @@ void RunResults::lockFailedRuns(RunLog& log) {
 
 void RunResults::close() {
   failedRuns_.close();
+  unkeptFiles_.close();
   if (simulatedValues_) simulatedValues_->close();
 }
 

@@ -29,6 +29,9 @@ class UnkeptFiles final {
   /// written.
   void add(int number, std::span<const UnkeptFile> files);
 
+  /// Throws FatalError if not all that was noted has reached the disk.
+  void close() { file_.close(); }
+
   /// By evaluation, those that have not been kept since.
   const UnkeptByNumber& files() const { return files_; }
   const std::string& path() const { return path_; }
