@@ -103,7 +103,12 @@ FileLock::Attempt FileLock::lockFile(int& file, Range range, int& error) {
       error = errno;
       return error == EAGAIN || error == EACCES ? Attempt::held : Attempt::impossible;
     }
-    if (!isAt(path_, file)) continue;  // removed in between
+    errno = 0;
+    if (!isAt(path_, file)) {
+      error = errno;
+      if (error == 0 || error == ENOENT) continue;  // removed in between
+      return Attempt::impossible;                   // it cannot be looked at
+    }
     descriptor_ = std::exchange(file, -1);
     return Attempt::taken;
   }

@@ -18,8 +18,9 @@ namespace {
 constexpr double kWorkerStopSeconds = 20.0;
 /// The same at the end of a task, when a worker that was not needed may still be copying a large base folder.
 constexpr double kWorkerPatienceSeconds = 600.0;
-/// The same once there is a kill file. It ends the run within five seconds, of which the launcher takes one or two.
-constexpr double kCancelledSeconds = 3.0;
+/// The same once there is a kill file. It ends the job within five seconds, of which the launcher takes one on each of
+/// its two levels.
+constexpr double kCancelledSeconds = 2.5;
 
 /// Whether the workers have had their time.
 class Patience {

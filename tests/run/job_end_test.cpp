@@ -29,10 +29,10 @@ TEST(JobEnd, TheMasterLeavesItsJobOrGivesUpAfterSomeTime) {
       {"after an error of the run", 1, false, true, 2, "", 0.0},
       {"a worker is silent at the end of the task", 0, false, true, 1, silent, 600.0},
       {"a worker is silent after an error", 1, false, true, 1, silent, 20.0},
-      {"a worker is silent after a cancellation", 1, true, true, 1, silent, 3.0},
-      {"the end of the task is cancelled", 0, true, true, 1, silent, 3.0},
+      {"a worker is silent after a cancellation", 1, true, true, 1, silent, 2.5},
+      {"the end of the task is cancelled", 0, true, true, 1, silent, 2.5},
       {"a worker is stopped behind its farewell", 1, true, false, 2,
-       "are aborted: a worker that has stopped does not end", 3.0},
+       "are aborted: a worker that has stopped does not end", 2.5},
       {"the way to them is broken", 1, false, true, -1, "are aborted: Error: MPI communication failed\nwhy", 0.0},
   };
   for (const Case& c : cases) {

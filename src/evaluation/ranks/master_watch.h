@@ -12,7 +12,7 @@ namespace mirevo {
 class MasterWatch {
  public:
   static constexpr double kLookSeconds = 0.5;      ///< between two looks at the file
-  static constexpr double kAnswerSeconds = 2.75;   ///< for a master that can answer
+  static constexpr double kAnswerSeconds = 2.25;   ///< for a master that can answer
   static constexpr double kClosingSeconds = 60.0;  ///< for one that has stopped its workers, and closes its files
 
   using Clock = std::function<double()>;

@@ -3,10 +3,13 @@
 #include <algorithm>
 #include <array>
 #include <cstdlib>
+#include <fstream>
 #include <string>
 #include <string_view>
 #include <unistd.h>
 #include <vector>
+
+#include <fmt/core.h>
 
 #include "common/text.h"
 
@@ -43,6 +46,14 @@ std::optional<int> launchedProcessCount() {
 bool launcherKeepsJob() {
   const char* value = std::getenv("OMPI_MCA_orte_enable_recovery");
   return value != nullptr && (value == std::string_view("1") || value == std::string_view("true"));
+}
+
+pid_t mpirunProcess() {
+  constexpr std::array<std::string_view, 3> kNames = {"mpirun", "mpiexec", "orterun"};
+  const pid_t parent = ::getppid();
+  std::string name;
+  std::getline(std::ifstream(fmt::format("/proc/{}/comm", parent)), name);
+  return std::find(kNames.begin(), kNames.end(), name) != kNames.end() ? parent : 0;
 }
 
 void hideJobFromModels() {

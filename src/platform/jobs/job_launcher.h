@@ -1,6 +1,7 @@
 #pragma once
 
 #include <optional>
+#include <sys/types.h>
 
 namespace mirevo {
 
@@ -13,6 +14,10 @@ std::optional<int> launchedProcessCount();
 /// Whether the launcher lets the job go on when processes of it are lost (`mpirun --enable-recovery`). It then ends no
 /// other process when one aborts the job, and its own exit code is 0 whatever theirs are.
 bool launcherKeepsJob();
+
+/// The process of mpirun, if it is what has started this one; 0 if a daemon of it on another node or a script has, or
+/// if it is gone.
+pid_t mpirunProcess();
 
 /// Removes the launcher's variables from the environment: a model that uses MPI itself would take itself for a process
 /// of this job.

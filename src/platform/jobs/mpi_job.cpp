@@ -57,6 +57,11 @@ std::string errorText(int code) {
   return {text.data(), static_cast<std::size_t>(length)};
 }
 
+/// mpirun ends all processes, and then itself with 1.
+void endLauncher() {
+  if (const pid_t launcher = mpirunProcess(); launcher > 0) ::kill(launcher, SIGTERM);
+}
+
 void check(int code, std::string_view call) {
   if (code == MPI_SUCCESS) return;
   fatalError(kCommunicationFailed, fmt::format("{}: {}", call, errorText(code)));
@@ -194,7 +199,7 @@ bool MpiJob::finalise(const std::function<bool()>& isEnough) {
 // NOLINTEND(clang-analyzer-optin.mpi.MPI-Checker)
 
 void MpiJob::abort(int exitCode) {
-  if (isKept_) ::kill(::getppid(), SIGTERM);  // the launcher, for which MPI_Abort ends this process alone
+  if (isKept_) endLauncher();  // MPI_Abort would end this process alone
   ::signal(SIGALRM, SIG_DFL);
   ::alarm(kAbortSeconds);
   if (hasWorkers()) MPI_Abort(MPI_COMM_WORLD, exitCode);
@@ -203,7 +208,7 @@ void MpiJob::abort(int exitCode) {
 
 void MpiJob::end(int exitCode) {
   if (hasWorkers()) abort(exitCode);
-  if (isKept_ && exitCode != 0) ::kill(::getppid(), SIGTERM);  // which makes its exit code 1
+  if (isKept_ && exitCode != 0) endLauncher();  // which makes its exit code 1
 }
 
 }  // namespace

@@ -133,8 +133,8 @@ TEST_F(RankWorkerTest, AKillFileThatTheMasterDoesNotAnswerEndsTheJob) {
   watch_ = MasterWatch(
       killFile, [this] { return now_; }, [this] { job_.abort(1); });
   enum class Wait { forASet, forTheModel, forStop, forTheOthers };
-  for (const auto& [wait, seconds] : {std::pair(Wait::forASet, 3.0), std::pair(Wait::forTheModel, 3.0),
-                                      std::pair(Wait::forStop, 3.0), std::pair(Wait::forTheOthers, 60.0)}) {
+  for (const auto& [wait, seconds] : {std::pair(Wait::forASet, 2.5), std::pair(Wait::forTheModel, 2.5),
+                                      std::pair(Wait::forStop, 2.5), std::pair(Wait::forTheOthers, 60.0)}) {
     SCOPED_TRACE(static_cast<int>(wait));
     job_.sent.clear();
     const double start = now_;
