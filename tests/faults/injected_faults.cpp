@@ -22,7 +22,7 @@ struct Fault {
   std::string text() const { return fmt::format("{}\t{}\t{}\t{}\t{}", call.first, call.second, number, error, how); }
 };
 
-/// The errors that each call may meet in practice; the first of a call is the one that the short form tries.
+/// The errors that each call may meet in practice. The short form takes them in turn, one for each kind of file.
 const std::map<std::string, std::vector<std::pair<int, const char*>>>& errorsOfCalls() {
   static const std::map<std::string, std::vector<std::pair<int, const char*>>> errors = {
       {"open-to-write", {{ENOSPC, "once"}, {EACCES, "once"}, {EMFILE, "lasting"}, {EDQUOT, "once"}}},
@@ -170,9 +170,12 @@ std::vector<Fault> faultsOf(const std::map<Call, int>& counts, bool isLong, cons
     // What cannot be read of a batch's output is said in its place, where failures are described.
     if (call.first == "read-at" && call.second.ends_with("mirevo_batch.log")) continue;
     if (!isLong && !isTriedInShort(call, tried, triedInShort)) continue;
-    for (const auto& [error, how] : errors->second) {
-      for (const int number : numbersToFail(count, isLong)) faults.push_back({call, number, error, how});
-      if (!isLong) break;
+    const auto& all = errors->second;
+    for (std::size_t i = 0; i < all.size(); ++i) {
+      if (!isLong && i != triedInShort.size() % all.size()) continue;
+      for (const int number : numbersToFail(count, isLong)) {
+        faults.push_back({call, number, all[i].first, all[i].second});
+      }
     }
   }
   return faults;
