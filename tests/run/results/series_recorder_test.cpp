@@ -133,9 +133,10 @@ TEST_F(SeriesRecorderTest, GoesOnFromAnEarlierFileAndWarnsOnceWhereItCannotWrite
   evaluate(withoutFile, 4, 2.0);
   withoutFile.finish(best_);
   EXPECT_FALSE(table().initial) << "a later evaluation is not the initial one";
-  EXPECT_THAT(warnings_,
-              ElementsAre("The series of the initial evaluation, No. 1, are not in s_Series.dat: they were not "
-                          "written yet when the run was interrupted"));
+  EXPECT_THAT(
+      warnings_,
+      ElementsAre(
+          "The series of the initial evaluation, No. 1, are not in s_Series.dat: the earlier run left none of them"));
   warnings_.clear();
 
   std::filesystem::remove(folder_ / "s_Series.dat");
@@ -175,8 +176,8 @@ TEST_F(SeriesRecorderTest, OfAnEarlierRunShowsTheTrueBestFromWhatWasKeptOrSaysTh
     } else {
       EXPECT_THAT(shown.best, ElementsAre(gap, gap));
     }
-    const char* const said =
-        isKept ? "are there at the times of the observations alone" : "are not in s_Series.dat: they";
+    const char* const said = isKept ? "are there at the times of the observations alone"
+                                    : "are not in s_Series.dat: the earlier run left none";
     EXPECT_THAT(folder_.read("s_Series.dat"),
                 AllOf(HasSubstr(fmt::format("# The series of the initial evaluation, No. 1, {}", said)),
                       HasSubstr(fmt::format("# The series of the best evaluation, No. 3, {}", said))));
