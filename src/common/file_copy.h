@@ -4,8 +4,8 @@
 
 namespace mirevo {
 
-/// Copies the content of a file to an empty one, both open at their beginning, in the cheapest way that the file systems
-/// offer. Holes stay holes. False, with the reason in errno, when that fails.
+/// Copies the content of a file to an empty one, both open at their beginning, in the cheapest way that the file
+/// systems offer. Holes stay holes. False, with the reason in errno, when that fails.
 bool copyContent(int from, int to);
 
 /// Copies a regular file with its mode and times. The copy is written as `target` + ".part" and renamed, so that

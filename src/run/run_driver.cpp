@@ -595,9 +595,9 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
     showMessage(explained);
     tellOfBestThatDiffers();
   }
+  stopWorkersOf(state_);
   closeResultsOfEarlyEnd({RunStage::failed, std::string(message), explained}, statistics);
   if (launcher_) launcher_->haltProcesses();  // before the report, which takes time
-  stopWorkersOf(state_);
   reportRun();
   return endEarly(message);
 }

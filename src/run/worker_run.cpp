@@ -2,7 +2,10 @@
 
 #include <new>
 #include <optional>
+#include <string>
+#include <string_view>
 #include <utility>
+#include <vector>
 
 #include <fmt/core.h>
 
@@ -42,8 +45,11 @@ void work(Job& job, std::optional<MasterWatch>& watch) {
   signalState.haltProcesses = haltProcessesFromSignal;
   ModelDescription model = describeModel(config);
   model.runsAtOnce = job.processCount() - 1;  // they may share a disk
-  ModelRunner runner(std::move(model), parameters, aggregator, launcher, launcherSettings(config, 1, job.rank()));
-  runWorkerLoop(job, runner, *watch);
+  LauncherSettings settings = launcherSettings(config, 1, job.rank());
+  std::vector<std::string> warnings;
+  settings.warn = [&warnings](std::string_view text) { warnings.emplace_back(text); };
+  ModelRunner runner(std::move(model), parameters, aggregator, launcher, settings);
+  runWorkerLoop(job, runner, *watch, std::exchange(warnings, {}));
 }
 
 void workOrReport(Job& job, std::optional<MasterWatch>& watch) {

@@ -68,6 +68,10 @@ void RankEvaluator::handle(const Message& message) {
       const ReadyMessage& place = worker(message.rank).place.emplace(decodeReady(message.content));
       observer_.message(
           fmt::format("Worker {} is ready on {}, process folder {}", message.rank, place.host, place.processFolder));
+      for (const std::string& text : place.warnings) {  // other workers may say the same
+        if (warningsOfFolders_.insert(text).second)
+          observer_.warning(fmt::format("{}: {}", nameOf(message.rank), text));
+      }
       return;
     }
     case RankMessage::result:

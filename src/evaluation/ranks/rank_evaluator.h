@@ -3,6 +3,7 @@
 #include <functional>
 #include <optional>
 #include <set>
+#include <string>
 #include <vector>
 
 #include "evaluation/evaluation_ledger.h"
@@ -61,6 +62,7 @@ class RankEvaluator final : public Evaluator {
   EvaluationObserver& observer_;
   EvaluationLedger ledger_;
   std::vector<Worker> workers_;  ///< of ranks 1, 2, ...
+  std::set<std::string> warningsOfFolders_;
 };
 
 /// Sends `message` to every worker, in rank order. A job of one process has none.

@@ -26,7 +26,7 @@ struct Layout<SetMessage> {
 };
 template <>
 struct Layout<ReadyMessage> {
-  static void of(auto& archive, auto& message) { archive(message.host, message.processFolder); }
+  static void of(auto& archive, auto& message) { archive(message.host, message.processFolder, message.warnings); }
 };
 template <>
 struct Layout<ResultMessage> {

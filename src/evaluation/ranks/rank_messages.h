@@ -36,6 +36,7 @@ struct BeginMessage {
 struct ReadyMessage {
   std::string host;
   std::string processFolder;
+  std::vector<std::string> warnings = {};  ///< on the making of the folder
 };
 
 /// A set to be run.

@@ -76,9 +76,11 @@ std::optional<ResultMessage> runModel(Job& job, ModelRunner& runner, const SetMe
 
 }  // namespace
 
-void runWorkerLoop(Job& job, ModelRunner& runner, MasterWatch& watch) {
-  sendToMaster(job, RankMessage::ready, encode(ReadyMessage{hostName(), runner.launcher().getProcessFolder(kSlot)}));
-  std::vector<std::string> warnings;  // on folders kept since the last result; sent with the next one
+void runWorkerLoop(Job& job, ModelRunner& runner, MasterWatch& watch, std::vector<std::string> warnings) {
+  sendToMaster(
+      job, RankMessage::ready,
+      encode(ReadyMessage{hostName(), runner.launcher().getProcessFolder(kSlot), std::exchange(warnings, {})}));
+  // From now on warnings are on folders kept since the last result; sent with the next one
   while (true) {
     const Message message = await(job, &watch);
     if (message.tag == static_cast<int>(RankMessage::stop)) return;

@@ -1,6 +1,8 @@
 #pragma once
 
 #include <optional>
+#include <string>
+#include <vector>
 
 #include "evaluation/model_run.h"
 #include "evaluation/ranks/master_watch.h"
@@ -10,8 +12,9 @@
 namespace mirevo {
 
 /// The loop of a worker: runs each set that the master sends, in slot 1, and sends back its result, until the master
-/// sends stop; a model that is still running is then ended. Throws FatalError as ModelRunner does.
-void runWorkerLoop(Job& job, ModelRunner& runner, MasterWatch& watch);
+/// sends stop; a model that is still running is then ended. `warnings`: on the making of its process folder. Throws
+/// FatalError as ModelRunner does.
+void runWorkerLoop(Job& job, ModelRunner& runner, MasterWatch& watch, std::vector<std::string> warnings = {});
 
 /// Waits for the master's begin message; empty when stop comes instead.
 std::optional<BeginMessage> awaitBegin(Job& job);

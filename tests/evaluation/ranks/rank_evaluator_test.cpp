@@ -25,7 +25,9 @@ class RankEvaluatorTest : public EvaluationTest {
     master_ = std::make_unique<RankEvaluator>(*runner_, job_, observer_, *failedRuns_, earlier_.get());
     return *master_;
   }
-  void becomeReady(int rank) { job_.deliver(rank, RankMessage::ready, encode(ReadyMessage{"node", "/folder"})); }
+  void becomeReady(int rank, const std::vector<std::string>& warnings = {}) {
+    job_.deliver(rank, RankMessage::ready, encode(ReadyMessage{"node", "/folder", warnings}));
+  }
   void answer(int rank) {
     const double measure = running_.at(rank) - 1.0;
     // The aggregate is the worker's own, which counts for nothing.
@@ -55,17 +57,18 @@ class RankEvaluatorTest : public EvaluationTest {
 
 TEST_F(RankEvaluatorTest, WhoeverIsFreeGetsTheNextSetAndResultsStandInTheOrderOfTheSets) {
   RankEvaluator& master = makeMaster();
-  becomeReady(2);
-  becomeReady(1);
+  becomeReady(2, {"no locks"});
+  becomeReady(1, {"no locks"});
   answerLargestFirst();
   const auto results = evaluate(master, {4.0, 2.0, 9.5, 3.0, 6.0});  // the third one violates a constraint
   EXPECT_THAT(measuresOf(results), ElementsAre(3.0, 1.0, kFailedRunValue, 2.0, 5.0));
   EXPECT_EQ(results[0].aggregate, 3.0) << "the master's own";
   EXPECT_THAT(
       observer_.events,
-      ElementsAre("Worker 2 is ready on node, process folder /folder", "Evaluation of parameter set No. 1 initiated",
-                  "Worker 1 is ready on node, process folder /folder", "Evaluation of parameter set No. 2 initiated",
-                  "Evaluation of parameter set No. 1 completed: OK", "record 1 a=4 OK",
+      ElementsAre("Worker 2 is ready on node, process folder /folder", "warning: worker 2 on node: no locks",
+                  "Evaluation of parameter set No. 1 initiated", "Worker 1 is ready on node, process folder /folder",
+                  "Evaluation of parameter set No. 2 initiated", "Evaluation of parameter set No. 1 completed: OK",
+                  "record 1 a=4 OK",
                   "Evaluation of parameter set No. 3 completed: FAILED - parameter constraints violated",
                   "record 3 a=9.5 FAILED", "Evaluation of parameter set No. 4 initiated",
                   "Evaluation of parameter set No. 4 completed: OK", "record 4 a=3 OK",
