@@ -98,6 +98,11 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
   if (known) {
     known->shownSeries = std::move(result.shownSeries);
     if (result.ok()) known->pairs = std::move(result.pairs);
+    if (!result.ok() && earlier_->repeatsRun(result.number)) {
+      observer_.warning(fmt::format("{} was made again for its pairs: the model run failed: {}. Further runs are "
+                                    "compared with the next successful one",
+                                    progress::nameOfEvaluation(result.number), result.failure->reason));
+    }
     return replay(place, std::move(*known));
   }
   observer_.evaluationFinished(sets_[place], result);

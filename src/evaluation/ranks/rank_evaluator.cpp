@@ -103,6 +103,7 @@ void RankEvaluator::finishAnswered() {
       ++rank;
     }
   }
+  freeOneThatWaits();
 }
 
 void RankEvaluator::finish(Worker& worker, int rank) {
@@ -132,13 +133,13 @@ void RankEvaluator::giveUp(int rank, const GivenUpMessage& message) {
     failWithoutSlots(damage);
   }
   observer_.warning(givenUpWarning(fmt::format("Worker {}", rank), damage));
-  freeOneThatWaits();
 }
 
 void RankEvaluator::freeOneThatWaits() {
   const auto isBound = [](const Worker& each) { return each.isGivenUp || each.answer; };
   if (!std::all_of(workers_.begin(), workers_.end(), isBound)) return;
   const auto waiting = std::find_if(workers_.begin(), workers_.end(), [](const Worker& each) { return each.answer; });
+  if (waiting == workers_.end()) return;
   waiting->answer.reset();
   ledger_.putBack(*std::exchange(waiting->set, std::nullopt));
 }

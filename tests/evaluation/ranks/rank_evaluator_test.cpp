@@ -214,7 +214,9 @@ TEST_F(RankEvaluatorTest, TheSetOfAWorkerThatIsGivenUpIsAnothersUntilNoneIsLeft)
                          "left"));
 }
 
-TEST_F(RankEvaluatorTest, AWorkerThatWaitsRunsTheSetThatTheLastOtherHasGivenBack) {
+class SetGivenBackTest : public RankEvaluatorTest, public testing::WithParamInterface<bool> {};
+
+TEST_P(SetGivenBackTest, IsRunByTheWorkerWhoseOwnResultWaitsForIt) {
   RankEvaluator& master = makeMaster();
   becomeReady(1);
   becomeReady(2);
@@ -222,15 +224,18 @@ TEST_F(RankEvaluatorTest, AWorkerThatWaitsRunsTheSetThatTheLastOtherHasGivenBack
     if (!job_.arriving.empty()) return;
     observer_.cancelled = running_.empty();  // or it would wait for ever
     if (observer_.cancelled) return;
-    const int last = running_.rbegin()->first;
+    const bool isGivenBackFirst = GetParam();
+    const int rank = isGivenBackFirst ? running_.begin()->first : running_.rbegin()->first;
     pairs_ = {{.count = 5}};
-    pairs_[0].file.endsLine = running_.at(last) == 2.0;
-    if (last == 2) return answer(last);
-    running_.erase(last);
+    pairs_[0].file.endsLine = running_.at(rank) == 2.0;
+    if (rank == 2) return answer(rank);
+    running_.erase(rank);
     job_.deliver(1, RankMessage::givenUp, encode(GivenUpMessage{"Unable to open x", "no such file", {}}));
   };
   EXPECT_THAT(measuresOf(evaluate(master, {2.0, 4.0})), ElementsAre(1.0, kFailedRunValue));
 }
+
+INSTANTIATE_TEST_SUITE_P(BeforeAndAfter, SetGivenBackTest, testing::Bool());
 
 }  // namespace
 }  // namespace mirevo
