@@ -21,10 +21,6 @@ constexpr std::string_view kReportHead =
     "<!doctype html>\n<html lang=\"en\">\n<head>\n<meta charset=\"utf-8\">\n<meta "
     "http-equiv=\"Content-Security-Policy\" content=\"default-src 'none'; script-src";
 
-bool isTerminationLog(std::string_view text) {
-  return text.size() < 200 && (text.ends_with("Successful completion\n") || text.ends_with("Abnormal completion\n"));
-}
-
 /// Of a file that a full disk or a kill has cut off before the end of its mark.
 bool isPartOfHead(std::string_view text, const RunFile& file) {
   using namespace run_files;
@@ -92,6 +88,10 @@ std::string unreadable(const std::string& reason) {
 }
 
 }  // namespace
+
+bool isTerminationLog(std::string_view text) {
+  return text.size() < 200 && (text.ends_with("Successful completion\n") || text.ends_with("Abnormal completion\n"));
+}
 
 bool carriesMark(const std::string& path, const RunFile& file) {
   std::string reason;

@@ -1,11 +1,14 @@
 #pragma once
 
 #include <string>
+#include <string_view>
 
 #include "common/run_files.h"
 
 namespace mirevo {
 
+/// Whether the text is that of a termination log; one of a run that goes on is empty.
+bool isTerminationLog(std::string_view text);
 /// Whether the first lines of the file are those of a run's.
 bool carriesMark(const std::string& path, const RunFile& file);
 /// Why a run must not rename, replace or remove what is at `path`, as a sentence with the remedy. Empty where it may:

@@ -3,12 +3,16 @@
 #include <cerrno>
 #include <cstring>
 #include <fcntl.h>
+#include <filesystem>
+#include <string>
+#include <string_view>
+#include <system_error>
 #include <unistd.h>
 
 #include <fmt/core.h>
 
+#include "common/files.h"
 #include "common/replaceable_files.h"
-#include "common/run_files.h"
 #include "platform/signals/signal_state.h"
 #include "platform/terminal/front_end.h"
 #include "run/results/record_file.h"
@@ -22,7 +26,12 @@ void setTerminationLogUnit(int unit) {
 
 std::string openTerminationLog(const std::string& path) {
   if (signalState.terminationLogUnit > 0) return {};
-  if (carriesMark(path, run_files::kLog)) keepEarlierFile(path);  // the log of a setup `basin_Termination.kdx`
+  // A user's own file, or the log of a setup `basin_Termination.kdx`. What a link leads to stays as it is.
+  std::string reason;
+  std::error_code ignored;
+  const bool isFile = std::filesystem::symlink_status(path, ignored).type() == std::filesystem::file_type::regular;
+  const std::string head = isFile ? readFileHead(path, reason).value_or(std::string()) : std::string();
+  if (!head.empty() && !isTerminationLog(head)) keepEarlierFile(path);
   // Removed rather than emptied: an earlier run that is just ending then writes its last line to its own file.
   ::unlink(path.c_str());
   const int unit = ::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_APPEND | O_CLOEXEC, 0666);

@@ -174,9 +174,10 @@ TEST(StopRun, ATerminationLogIsThatOfTheLatestRunAndAnEarlierOneStillWritesItsOw
     writeLineFromSignal(earlier, "of the earlier run");
     stopRun(0);
   };
-  folder.write("a.log", "of a run long ago\n");
+  folder.write("a.log", "of another origin\n");
   EXPECT_EXIT(actWithHandlers(folder, runTwice), ::testing::ExitedWithCode(0), "");
   EXPECT_EQ(folder.read("a.log"), "Successful completion\n");
+  EXPECT_EQ(folder.read("a.1.log"), "of another origin\n");
   EXPECT_FALSE(folder.exists("b.log"));
   EXPECT_THAT(openTerminationLog(folder / "no/such/folder/a.log"), StartsWith("Unable to open"));
 }

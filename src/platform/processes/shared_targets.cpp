@@ -48,16 +48,18 @@ std::uint64_t stateOf(const std::string& path) {
   return state;
 }
 
-/// How many names of that file are in the folder.
-nlink_t namesIn(const std::string& folder, const struct stat& file) {
+/// Whether the file has a name outside the folder, as far as the folder can be looked through.
+bool hasNameOutside(const std::string& folder, const struct stat& file) {
   nlink_t names = 0;
+  int entries = 0;
   visitEntries(folder, [&](const fs::directory_entry& entry) {
+    ++entries;
     struct stat status {};
     const bool isSame =
         ::lstat(entry.path().c_str(), &status) == 0 && status.st_ino == file.st_ino && status.st_dev == file.st_dev;
     if (isSame) ++names;
   });
-  return names;
+  return entries < kMostEntries && names < file.st_nlink;
 }
 
 }  // namespace
@@ -101,7 +103,7 @@ std::vector<std::string> SharedTargets::takeHardLinked(const std::string& folder
     struct stat status {};
     const std::string path = folder + file;
     if (::stat(path.c_str(), &status) != 0 || !S_ISREG(status.st_mode) || status.st_nlink < 2) continue;
-    if (namesIn(folder, status) >= status.st_nlink) continue;
+    if (!hasNameOutside(folder, status)) continue;
     lines.push_back(fmt::format(
         "{} has another name outside its process folder, by a hard link: if other model runs write the same "
         "file, those at the same time disturb each other. Let the model write a file of its own.",

@@ -101,7 +101,24 @@ std::vector<const KdxSection*> itemsBeyond(const KdxSection& node, std::string_v
   return items;
 }
 
-/// The names of the first of them.
+std::string_view itemPrefix(std::string_view pattern) {
+  return pattern.substr(0, pattern.size() - 1);
+}
+
+/// The first item section that the count of the list announces and that is not there. `pattern`: "MEASURE_n"; other
+/// names are those of no items.
+std::optional<std::string> firstMissingItem(const KdxSection& list, std::string_view pattern) {
+  const KdxKeyword* keyword = list.keyword(kItemCountKeyword);
+  const auto* count = keyword == nullptr ? nullptr : std::get_if<std::int32_t>(&keyword->values.front().value);
+  if (count == nullptr || !pattern.ends_with("_n")) return std::nullopt;
+  for (std::int32_t number = 1; number <= *count; ++number) {
+    std::string name = fmt::format("{}{}", itemPrefix(pattern), number);
+    if (list.section(name) == nullptr) return name;
+  }
+  return std::nullopt;
+}
+
+/// The names of the first of itemsBeyond().
 std::string namesBeyond(const KdxSection& node, std::string_view prefix, std::size_t count) {
   constexpr std::size_t kMostNames = 8;
   const std::vector<const KdxSection*> items = itemsBeyond(node, prefix, count);
@@ -181,6 +198,19 @@ std::string SetupFile::linesToAdd(std::string_view parent, std::string_view open
       misspelt +=
           fmt::format("\nmisspelt, too, in [{}]: found {}, did you mean {}?", inWhich.empty() ? kSetupTarget : inWhich,
                       quotedForMessage(*found), quotedForMessage(name));
+    }
+  }
+  for (const std::string_view path : needed_) {
+    const KdxSection* list = sectionAt(*target, path);
+    if (list == nullptr || path == parent) continue;
+    for (const std::string& pattern : schema_.sectionNamesInside(patternOf(path))) {
+      const std::optional<std::string> item = firstMissingItem(*list, pattern);
+      if (!item) continue;
+      if (itemsBeyond(*list, itemPrefix(pattern), 0).empty()) {
+        add(path, *item);
+      } else {
+        misspelt += fmt::format("\nmissing, too, in [{}]: [{}]", path, *item);
+      }
     }
   }
   if (count > kMostSections) lines += fmt::format("\n   and {} more", count - kMostSections);

@@ -41,7 +41,11 @@ class EntryCheck final {
  private:
   void checkKeyword(const KdxSection& node, const KdxKeyword& keyword, const std::string& pattern) {
     const KeywordRow* row = file_.schema().findKeyword(pattern, keyword.name);
-    if (row == nullptr) {
+    if (keyword.name == kUnusedTimeKeyword) {
+      report(keyword.position, fmt::format("keyword {} is not used; MaxSimulationTime in [SimultaneousSimulations] "
+                                           "limits the time of a model run",
+                                           quotedForMessage(keyword.name)));
+    } else if (row == nullptr) {
       std::vector<std::string> known;
       if (const SectionRow* section = file_.schema().findSection(pattern)) {
         for (const KeywordRow& other : section->keywords) known.emplace_back(other.name());
@@ -49,10 +53,6 @@ class EntryCheck final {
       warn(keyword.position, "keyword", keyword.name, nearestName(keyword.name, known));
     } else if (row->type != KeywordType::textLines && node.keyword(keyword.name) != &keyword) {
       warnRepeated(keyword.position, "keyword", keyword.name, node.keyword(keyword.name)->position);
-    } else if (keyword.name == kUnusedTimeKeyword) {
-      report(keyword.position, fmt::format("keyword {} is not used; MaxSimulationTime in [SimultaneousSimulations] "
-                                           "limits the time of a model run",
-                                           quotedForMessage(keyword.name)));
     }
   }
 

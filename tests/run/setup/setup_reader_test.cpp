@@ -95,6 +95,10 @@ TEST_F(SetupReaderTest, RefusesWhatCannotBeReadAndSaysWhere) {
        "[MIREVO_SIMULATION_OPTION/SIMPARAM]:\n   [SIMPARAMITEM_1]\n     ParamFileName = ...\n     TemplateFileName = "
        "...\n   [/SIMPARAMITEM_1]\n   in [OPTIMISATION_ALGORITHM]:\n   [STOPPING_CRITERIA]\n     "
        "Max_No_Evaluations = ...\n   [/STOPPING_CRITERIA]"},
+      {"TqSEKdxListItemCount = 3 => 4 & [MEASURE_1] => [First] & [/MEASURE_1] => [/First]",
+       " section PARAMETER_4 in KDX file\nsetup.kdx:19:3: expected section [PARAMETER_4] in section MODEL_PARAMETERS\n"
+       "setup.kdx:20:28: TqSEKdxListItemCount is 4, and there are here: PARAMETER_1, PARAMETER_2, PARAMETER_3\n"
+       "missing, too, in [ObjectiveFunctions/OUTPUT_MEASURES]: [MEASURE_1]"},
       {"[SimultaneousSimulations] => [Simultaneous] & [/SimultaneousSimulations] => [/Simultaneous]",
        " section SimultaneousSimulations in KDX file\nsetup.kdx:1:1: expected section [SimultaneousSimulations] in "
        "section MIREVO_PARAMETERS\nsections to add:\n   in [MIREVO_PARAMETERS]:\n   [SimultaneousSimulations]\n   "
