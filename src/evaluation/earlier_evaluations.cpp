@@ -25,9 +25,9 @@ std::optional<EvaluationResult> EarlierEvaluations::take(int number, std::span<c
   return result;
 }
 
-bool EarlierEvaluations::repeatsRun(int number) const {
+const std::vector<double>* EarlierEvaluations::measuresOfRepeated(int number) const {
   const auto found = records_.find(number);
-  return found != records_.end() && found->second.repeatsRun;
+  return found != records_.end() && found->second.repeatsRun ? &found->second.result.measureValues : nullptr;
 }
 
 void EarlierEvaluations::requireSameValues(int number, std::span<const double> earlier,

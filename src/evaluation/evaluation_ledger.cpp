@@ -51,7 +51,8 @@ std::optional<std::size_t> EvaluationLedger::takeNext() {
   if (next_ == sets_.size() && returned_.empty()) return std::nullopt;
   if (openCount_ > 0 && runComparison_.isAwaited()) return std::nullopt;
   ++openCount_;
-  if (returned_.empty()) return next_++;
+  // In their order: a result may wait for that of a set before it.
+  if (returned_.empty() || (next_ < sets_.size() && next_ < *returned_.begin())) return next_++;
   const std::size_t first = *returned_.begin();
   returned_.erase(returned_.begin());
   return first;
@@ -60,6 +61,12 @@ std::optional<std::size_t> EvaluationLedger::takeNext() {
 void EvaluationLedger::putBack(std::size_t place) {
   returned_.insert(place);
   --openCount_;
+}
+
+std::vector<double> EvaluationLedger::repeatedMeasures(std::size_t place) const {
+  if (runAgain_.contains(place)) return results_[place].measureValues;
+  const auto* measures = earlier_ == nullptr || isFinalRun_ ? nullptr : earlier_->measuresOfRepeated(numberOf(place));
+  return measures == nullptr ? std::vector<double>() : *measures;
 }
 
 void EvaluationLedger::markInitiated(std::size_t place) {
@@ -85,8 +92,10 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
     observer_.message(progress::completedMessage(result.number, outcome));
     return finishAgain(place, result);
   }
+  const std::vector<double> repeated = repeatedMeasures(place);
   const bool isNews = !result.unkeptFiles.empty() || (earlier_ != nullptr && earlier_->isRunAgain(result.number));
-  if (result.ok() && isNews) observer_.recordUnkeptFiles(result.number, result.unkeptFiles);
+  if (result.ok() && isNews && (repeated.empty() || repeated == result.measureValues))
+    observer_.recordUnkeptFiles(result.number, result.unkeptFiles);
   std::optional<EvaluationResult> known;  // a repeated run has its row already, which is kept
   if (earlier_ != nullptr) known = earlier_->take(result.number, sets_[place]);
   ComparisonFindings found;
@@ -99,9 +108,10 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
     known->shownSeries = std::move(result.shownSeries);
     if (result.ok()) known->pairs = std::move(result.pairs);
     if (!result.ok() && earlier_->repeatsRun(result.number)) {
-      observer_.warning(fmt::format("{} was made again for its pairs: the model run failed: {}. Further runs are "
-                                    "compared with the next successful one",
-                                    progress::nameOfEvaluation(result.number), result.failure->reason));
+      observer_.warning(
+          fmt::format("{} was made again for its pairs: the model run failed: {}. Further runs are "
+                      "compared with the next successful one",
+                      progress::nameOfEvaluation(result.number), result.failure->reason));
     }
     return replay(place, std::move(*known));
   }
@@ -115,7 +125,7 @@ void EvaluationLedger::finishAgain(std::size_t place, const EvaluationResult& re
   const std::string again = progress::nameOfEvaluation(result.number) + " was made again for its output files: ";
   if (!result.ok()) return observer_.warning(again + "the model run failed: " + result.failure->reason);
   if (result.measureValues != results_[place].measureValues) {
-    observer_.warning(again + "the model run has other results than before, which are kept");
+    return observer_.warning(again + "the model run has other results than before, and its files are not kept");
   }
   observer_.recordUnkeptFiles(result.number, result.unkeptFiles);
 }

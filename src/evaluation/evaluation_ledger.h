@@ -60,9 +60,12 @@ class EvaluationLedger final {
   /// had to be ended, or empty. Throws FatalError when the failed-run limit is exceeded.
   void finish(std::size_t place, EvaluationResult result, std::string_view leftBehind = {});
   /// Whether the process folder of this model run is to be kept; to be asked before finish().
-  bool isFolderWanted(const EvaluationResult& result) const {
-    return !result.ok() && failedRuns_.isFolderWanted(*result.failure);
+  bool isFolderWanted(std::size_t place, const EvaluationResult& result) const {
+    return !result.ok() && failedRuns_.isFolderWanted(*result.failure) && repeatedMeasures(place).empty();
   }
+  /// The output measures of the row that the evaluation of this set has already, if its model is run again beside it;
+  /// otherwise empty.
+  std::vector<double> repeatedMeasures(std::size_t place) const;
   bool isComplete() const { return finishedCount_ == sets_.size() && runAgain_.empty(); }
   /// Closes a complete batch and returns one result per set, in order. Warns if no model run so far depends on the
   /// parameters.

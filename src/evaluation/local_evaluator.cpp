@@ -77,14 +77,14 @@ bool LocalEvaluator::takeFinished() {
       runner_.launcher().isExecuting(slot, executing, status);
       if (executing != 0) continue;
       running->ended = runner_.collect(slot, [this] { stopIfCancelled(); });
-      runner_.keepOutputFiles(slot, ledger_.numberOf(place), *running->ended);
+      runner_.keepOutputFiles(slot, ledger_.numberOf(place), *running->ended, ledger_.repeatedMeasures(place));
     }
     // The slot waits, too, as the folder of a failed run may be kept.
     if (!ledger_.judge(place, *running->ended)) continue;
     any = true;
     EvaluationResult result = std::move(*running->ended);
     running.reset();
-    if (ledger_.isFolderWanted(result)) runner_.keepFailedFolder(slot, ledger_.numberOf(place), result.warnings);
+    if (ledger_.isFolderWanted(place, result)) runner_.keepFailedFolder(slot, ledger_.numberOf(place), result.warnings);
     ledger_.finish(place, std::move(result), runner_.launcher().leftBehind(slot));
     startNext(slot);
   }

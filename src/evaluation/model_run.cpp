@@ -327,7 +327,9 @@ EvaluationResult ModelRunner::collect(int slot, std::function<void()> look) {
   beginReading(slot, std::move(look));
   const auto endReading = [this, began = runTimeClock()](ReadingWatch* watch) {
     watch->end();
-    readingSeconds_ += runTimeClock() - began;
+    const double seconds = runTimeClock() - began;
+    readingSeconds_ += seconds;
+    launcher_.excludeTime(seconds);
   };
   const std::unique_ptr<ReadingWatch, decltype(endReading)> reading(&series_.watch(), endReading);
   try {
@@ -434,8 +436,15 @@ bool ModelRunner::mayBeCutOff(const EvaluationResult& result) const {
   });
 }
 
-void ModelRunner::keepOutputFiles(int slot, int number, EvaluationResult& result) const {
-  for (UnkeptFile& file : savedFiles_.save(launcher_.getProcessFolder(slot), number)) {
+void ModelRunner::keepOutputFiles(int slot, int number, EvaluationResult& result,
+                                  std::span<const double> repeatedMeasures) const {
+  const bool isRepeated = !repeatedMeasures.empty();
+  // What was kept of the run that the row describes is not replaced with something else.
+  if (isRepeated && (!result.ok() || !std::equal(repeatedMeasures.begin(), repeatedMeasures.end(),
+                                                 result.measureValues.begin(), result.measureValues.end()))) {
+    return;
+  }
+  for (UnkeptFile& file : savedFiles_.save(launcher_.getProcessFolder(slot), number, isRepeated)) {
     result.warnings.push_back(file.reason);
     if (!file.isModelsDoing) result.unkeptFiles.push_back(std::move(file));
   }

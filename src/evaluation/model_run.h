@@ -78,7 +78,10 @@ class ModelRunner final {
 
   /// Keeps the output files of the slot's run, which belongs to evaluation `number`; adds those that could
   /// not be kept to `result`, with warnings. To be called before the slot's next run.
-  void keepOutputFiles(int slot, int number, EvaluationResult& result) const;
+  /// `repeatedMeasures`: of the row that the evaluation has already, if its model was run again beside it; files are
+  /// then kept only if the run has the same, and none of those that are there is replaced.
+  void keepOutputFiles(int slot, int number, EvaluationResult& result,
+                       std::span<const double> repeatedMeasures = {}) const;
 
   /// Keeps a copy of the slot's folder after a failed run; adds a line to `warnings` when that is not possible.
   void keepFailedFolder(int slot, int number, std::vector<std::string>& warnings) const;

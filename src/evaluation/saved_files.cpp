@@ -42,25 +42,27 @@ void SavedFiles::markAsOld(const std::string& processFolder) const {
   }
 }
 
-std::vector<UnkeptFile> SavedFiles::save(const std::string& processFolder, int number) const {
+std::vector<UnkeptFile> SavedFiles::save(const std::string& processFolder, int number, bool isRepeated) const {
   std::vector<UnkeptFile> problems;
   if (names_.empty()) return problems;
   // Files that an interrupted run has kept from this evaluation are not of this model run.
   std::error_code failedToRemove;
   const std::string earlier = fmt::format("{}/{}", folder_, number);
-  std::filesystem::remove_all(earlier, failedToRemove);
+  if (!isRepeated) std::filesystem::remove_all(earlier, failedToRemove);
   const std::string notRemoved =
       failedToRemove ? fmt::format("{} was not removed: {}", earlier, failedToRemove.message()) : std::string();
   for (const std::string& name : names_) {
     const std::string source = processFolder + name;
     const std::string target = fmt::format("{}/{}{}", folder_, number, name);
+    std::error_code ignored;
+    if (isRepeated && std::filesystem::exists(target, ignored)) continue;
     std::string reason = notRemoved;
     bool isModelsDoing = false;
     struct stat status {};
     if (!reason.empty()) {
       // What is there is not of this run, so that nothing may be added to it.
     } else if (::stat(source.c_str(), &status) != 0) {
-      isModelsDoing = errno == ENOENT || errno == ENOTDIR;
+      isModelsDoing = errno == ENOENT || errno == ENOTDIR || errno == ELOOP;
       reason = std::strerror(errno);
     } else if (isMarked(status)) {
       isModelsDoing = true;

@@ -23,8 +23,9 @@ class SavedFiles final {
   /// the run writes. They are not removed, as the model may read them.
   void markAsOld(const std::string& processFolder) const;
   /// After a run: copies each file to folder/number, with its path below the base folder. Returns those that could not
-  /// be kept, or that the run did not write.
-  std::vector<UnkeptFile> save(const std::string& processFolder, int number) const;
+  /// be kept, or that the run did not write. Files that are there already are those of an interrupted run, and removed,
+  /// or, with `isRepeated`, of an earlier run of the same evaluation, and stay.
+  std::vector<UnkeptFile> save(const std::string& processFolder, int number, bool isRepeated = false) const;
 
  private:
   std::vector<std::string> names_;  ///< below the base folder, with their leading "/"

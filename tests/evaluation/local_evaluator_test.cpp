@@ -358,8 +358,8 @@ TEST_F(LocalEvaluatorTest, ARunWhoseOutputFilesCouldNotBeKeptIsMadeAgainForThemA
   // Where files are kept, by how much the model run differs from before, what is told.
   const std::tuple<const char*, double, std::vector<std::string>> cases[] = {
       {"run_Saved", 0.0, {"2 lacks 0"}},
-      {"run_Saved", 0.5, {"has other results than before, which are kept", "2 lacks 0"}},
-      {"run_Saved", 1e9, {"not kept: No such file", "the model run failed"}},
+      {"run_Saved", 0.5, {"has other results than before, and its files are not kept"}},
+      {"run_Saved", 1e9, {"the model run failed"}},
       {"file/run_Saved", 0.0, {" was not kept: ", "2 lacks 1", " was not kept: ", "4 lacks 1"}}};
   for (const auto& [where, change, told] : cases) {
     description_.savedFiles = {folder_ / "base/simulated.csv"};
@@ -370,6 +370,7 @@ TEST_F(LocalEvaluatorTest, ARunWhoseOutputFilesCouldNotBeKeptIsMadeAgainForThemA
       return start == 1 && change > 1.0 ? fails(1.0) : computes(1.0, start == 1 ? 4.0 + change : 0.0);
     });
     observer_.events.clear();
+    if (change != 0.0) folder_.write("run_Saved/2/simulated.csv", "kept before");
     const auto results = evaluate(makeEvaluator(launcher, 1, 100), {2.0, 4.0, 6.0, 8.0});
     EXPECT_THAT(measuresOf(results), ElementsAre(1.0, 3.0, 5.0, 7.0)) << where << change;
     std::vector<testing::Matcher<std::string>> matchers;
@@ -380,8 +381,8 @@ TEST_F(LocalEvaluatorTest, ARunWhoseOutputFilesCouldNotBeKeptIsMadeAgainForThemA
     });
     EXPECT_THAT(observer_.events, testing::ElementsAreArray(matchers)) << where << change;
     EXPECT_FALSE(folder_.exists("run_Saved/1"));
-    if (where == std::string("run_Saved") && change <= 1.0) {
-      EXPECT_EQ(folder_.read("run_Saved/2/simulated.csv"), series(4.0 + change));
+    if (where == std::string("run_Saved")) {
+      EXPECT_EQ(folder_.read("run_Saved/2/simulated.csv"), change == 0.0 ? series(4.0) : "kept before");
     }
     std::filesystem::remove_all(folder_ / "run_Saved");
   }

@@ -53,7 +53,8 @@ void RankEvaluator::startNext(int rank) {
     auto failure = runner_.findUnrunnable(ledger_.set(*place));
     if (!failure) {
       job_.send(rank, static_cast<int>(RankMessage::set),
-                encode(SetMessage{ledger_.numberOf(*place), ledger_.set(*place), ledger_.standard()}));
+                encode(SetMessage{ledger_.numberOf(*place), ledger_.set(*place), ledger_.standard(),
+                                  ledger_.repeatedMeasures(*place)}));
       worker(rank).set = *place;
       ledger_.markInitiated(*place);
       return;
@@ -112,7 +113,7 @@ void RankEvaluator::finish(Worker& worker, int rank) {
   EvaluationResult& result = message.result;
   // Only the master knows the transformation determined from the initial sample.
   if (result.ok()) result.aggregate = runner_.aggregator().aggregate(result.objectiveValues);
-  if (ledger_.isFolderWanted(result)) {
+  if (ledger_.isFolderWanted(place, result)) {
     job_.send(rank, static_cast<int>(RankMessage::keepFolder), encode(KeepFolderMessage{ledger_.numberOf(place)}));
   }
   ledger_.finish(place, std::move(result), message.leftBehind);

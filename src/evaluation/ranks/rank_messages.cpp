@@ -22,7 +22,9 @@ struct Layout<BeginMessage> {
 };
 template <>
 struct Layout<SetMessage> {
-  static void of(auto& archive, auto& message) { archive(message.number, message.set, message.standard); }
+  static void of(auto& archive, auto& message) {
+    archive(message.number, message.set, message.standard, message.repeatedMeasures);
+  }
 };
 template <>
 struct Layout<ReadyMessage> {

@@ -44,6 +44,7 @@ struct SetMessage {
   int number = 0;  ///< number of the evaluation in the run, from 1
   ParameterSet set;
   RunStandard standard;
+  std::vector<double> repeatedMeasures;  ///< of the row that the evaluation has, if its model is run again beside it
 };
 
 struct ResultMessage {

@@ -66,7 +66,7 @@ std::optional<ResultMessage> runModel(Job& job, ModelRunner& runner, const SetMe
       if (isStopped(job, watch)) throw RunCancelled();
     };
     ResultMessage answer{runner.collect(kSlot, look), runner.launcher().leftBehind(kSlot), {}};
-    runner.keepOutputFiles(kSlot, message.number, answer.result);
+    runner.keepOutputFiles(kSlot, message.number, answer.result, message.repeatedMeasures);
     return answer;
   } catch (const RunCancelled&) {
     runner.launcher().haltProcesses();

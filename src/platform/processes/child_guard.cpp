@@ -2,13 +2,11 @@
 
 #include <algorithm>
 #include <cerrno>
-#include <climits>
 #include <csignal>
 #include <cstring>
 #include <ctime>
 #include <poll.h>
 #include <sys/prctl.h>
-#include <sys/resource.h>
 #include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -17,6 +15,7 @@
 
 #include "common/clock.h"
 #include "common/descriptor.h"
+#include "platform/processes/close_descriptors.h"
 
 namespace mirevo {
 namespace {
@@ -27,20 +26,6 @@ constexpr int kLookMilliseconds = 200;
 /// rarely.
 constexpr int kMostRenewals = 5;
 constexpr double kRareSeconds = 60.0;
-
-/// Closes all descriptors but one, which may be -1.
-void closeAllBut(int kept) {
-  const auto before = static_cast<unsigned>(std::max(kept, 0));
-  const bool hasRange = (kept <= 0 || ::syscall(SYS_close_range, 0U, before - 1, 0U) == 0) &&
-                        ::syscall(SYS_close_range, kept < 0 ? 0U : before + 1, UINT_MAX, 0U) == 0;
-  if (hasRange) return;
-  constexpr rlim_t kMost = 65536;
-  rlimit limit{};
-  const rlim_t count = ::getrlimit(RLIMIT_NOFILE, &limit) == 0 ? std::min(limit.rlim_cur, kMost) : kMost;
-  for (int fd = 0; fd < static_cast<int>(count); ++fd) {
-    if (fd != kept) ::close(fd);
-  }
-}
 
 /// Returns when the program has ended. `watched` is a pidfd of the program, or -1.
 void awaitEnd(pid_t program, int watched) {
@@ -60,7 +45,8 @@ void awaitEnd(pid_t program, int watched) {
   ::prctl(PR_SET_NAME, "mirevo_guard");
   // An open descriptor would keep a pipe open whose reader waits for the program's end; a current folder would keep its
   // file system busy.
-  closeAllBut(watched);
+  closeDescriptors(0, watched - 1);
+  closeDescriptors(std::max(watched + 1, 0));
   if (::chdir("/") != 0) ::_exit(1);
 
   awaitEnd(program, watched);

@@ -3,7 +3,6 @@
 #include <algorithm>
 #include <cerrno>
 #include <charconv>
-#include <climits>
 #include <cmath>
 #include <csignal>
 #include <cstring>
@@ -14,20 +13,27 @@
 #include <sys/prctl.h>
 #include <sys/resource.h>
 #include <sys/socket.h>
-#include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
 #include <utility>
+#include <vector>
 
 #include <fmt/core.h>
 
 #include "common/files.h"
 #include "common/reading_watch.h"
+#include "platform/processes/close_descriptors.h"
 
 namespace mirevo {
 namespace {
 
 constexpr int kLookMilliseconds = 100;
+
+/// Helpers that have not been reaped.
+std::vector<pid_t>& unreapedHelpers() {
+  static std::vector<pid_t> helpers;
+  return helpers;
+}
 
 [[noreturn]] void runHelper(pid_t parent, int socket, void (*serve)(int)) {
   ::prctl(PR_SET_PDEATHSIG, SIGKILL);
@@ -46,7 +52,7 @@ constexpr int kLookMilliseconds = 100;
   // What a library prints of a damaged file is for nobody.
   const int nowhere = ::open("/dev/null", O_RDWR);
   for (const int standard : {STDIN_FILENO, STDOUT_FILENO, STDERR_FILENO}) ::dup2(nowhere, standard);
-  ::syscall(SYS_close_range, static_cast<unsigned>(kSocket + 1), UINT_MAX, 0U);
+  closeDescriptors(kSocket + 1);
   try {
     serve(kSocket);
   } catch (const std::exception&) {
@@ -63,7 +69,10 @@ int reap(pid_t process) {
   int status = -1;
   for (int nap = 0; nap < kMostNaps; ++nap) {
     const pid_t ended = ::waitpid(process, &status, WNOHANG);
-    if (ended == process) return status;
+    if (ended == process) {
+      std::erase(unreapedHelpers(), process);
+      return status;
+    }
     if (ended < 0 && errno != EINTR) break;
     ::nanosleep(&kNap, nullptr);
   }
@@ -93,6 +102,7 @@ bool HelperProcess::start(void (*serve)(int), std::string& reason) {
   ::sigprocmask(SIG_SETMASK, &before, nullptr);
   ::close(sockets[1]);
   if (process_ > 0) {
+    unreapedHelpers().push_back(process_);
     socket_ = sockets[0];
     ::fcntl(socket_, F_SETFL, O_NONBLOCK);
     return true;
@@ -101,6 +111,10 @@ bool HelperProcess::start(void (*serve)(int), std::string& reason) {
   process_ = 0;
   reason = std::strerror(error);
   return false;
+}
+
+bool isHelperProcess(pid_t process) {
+  return std::find(unreapedHelpers().begin(), unreapedHelpers().end(), process) != unreapedHelpers().end();
 }
 
 bool HelperProcess::isRunning() const {

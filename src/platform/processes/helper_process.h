@@ -41,6 +41,9 @@ class HelperProcess final {
   int socket_ = -1;
 };
 
+/// Whether this child of the program is such a process, which it ends and reaps itself.
+bool isHelperProcess(pid_t process);
+
 /// The same in the helper, with the program at the other end; false when that is gone.
 bool sendFromHelper(int socket, const void* bytes, std::size_t size);
 bool receiveInHelper(int socket, void* bytes, std::size_t size);

@@ -55,6 +55,10 @@ std::string textOfSome(const std::vector<LeftProcess>& left, const std::string& 
                          process.problem);
   }
   if (count == 0) return {};
+  const bool isOfOther = std::any_of(left.begin(), left.end(), [&](const LeftProcess& process) {
+    return process.isOfOther && process.batchFile == batchFile && process.problem.empty() == isEnded;
+  });
+  if (isOfOther) names += "; without MIREVO_RUN in its environment it may be of another model run at that time";
   const char* const outcome = !isEnded ? "could not be ended" : count == 1 ? "was ended" : "were ended";
   return fmt::format("{} left {}, which {}: {}", batchFile,
                      count == 1 ? "a process running" : fmt::format("{} processes running", count), outcome, names);
@@ -173,7 +177,7 @@ std::optional<LeftProcesses::Adopted> LeftProcesses::describe(pid_t id) const {
 /// Whether it is to be ended with the slot's batch.
 bool LeftProcesses::belongsTo(const Adopted& process, int slot) const {
   if (process.slot > 0) return process.slot == slot;
-  return process.candidates.empty() || (process.candidates.size() == 1 && process.candidates.contains(slot));
+  return process.candidates.empty() || process.candidates.contains(slot);
 }
 
 void LeftProcesses::giveUp(pid_t id, Adopted& process, Slot& slot, std::string problem) {
@@ -205,7 +209,8 @@ bool LeftProcesses::areGone(int number, const std::string& batchFile, double now
     const auto isIt = [id = id](const LeftProcess& left) { return left.id == id; };
     if (std::none_of(slot.left.begin(), slot.left.end(), isIt)) {
       const auto found = findProcess(id);  // it may have become another program
-      slot.left.push_back({id, found ? found->name : process.name, batchFile, {}});
+      const bool isOfOther = process.slot == 0 && process.candidates.size() > 1;
+      slot.left.push_back({id, found ? found->name : process.name, batchFile, {}, isOfOther});
     }
     // Not reaped yet, so the number is still its own.
     if (!std::exchange(process.isKilled, true) && ::kill(id, SIGKILL) != 0) {

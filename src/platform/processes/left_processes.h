@@ -17,15 +17,17 @@ namespace mirevo {
 struct LeftProcess {
   pid_t id = 0;
   std::string name;
-  std::string batchFile;  ///< the item of the batch that left it, as far as that is known
-  std::string problem;    ///< why it could not be ended; empty if it was
+  std::string batchFile;   ///< the item of the batch that left it, as far as that is known
+  std::string problem;     ///< why it could not be ended; empty if it was
+  bool isOfOther = false;  ///< perhaps left by a batch of another slot
 };
 
 /// Finds and ends what a batch leaves outside its process groups, such as daemons. The program becomes the parent of
 /// every process of a model that loses its own parent: whether a batch has left anything is then told by the list of
 /// the program's children, whatever a process did to its session or its environment, and without a look at the other
 /// processes of the machine. To which slot a process belongs is told by its mark, else by its folder, files or command
-/// line; one without such a sign is ended when all batches that were running when it was first seen are over. Slots
+/// line; one without such a sign is ended with the first batch that is over of those that were running when it was seen
+/// first, as it may write to the results of any. Slots
 /// count from 1.
 class LeftProcesses final {
  public:

@@ -28,6 +28,7 @@
 #include "common/text.h"
 #include "platform/processes/argument_text.h"
 #include "platform/processes/batch_file_hints.h"
+#include "platform/processes/helper_process.h"
 #include "platform/processes/own_files.h"
 #include "platform/processes/process_folder.h"
 
@@ -175,7 +176,8 @@ void PosixProcessLauncher::startGuard() {
   if (!guard_->limitation().empty()) warn_ ? warn_(guard_->limitation()) : warnings_.push_back(guard_->limitation());
   left_ = std::make_unique<LeftProcesses>(mark_, [this](pid_t id) {
     const auto isGroup = [id](const std::atomic<pid_t>& entry) { return entry.load() == id; };
-    return id == guard_->process() || std::any_of(groups_->entries().begin(), groups_->entries().end(), isGroup);
+    return id == guard_->process() || isHelperProcess(id) ||
+           std::any_of(groups_->entries().begin(), groups_->entries().end(), isGroup);
   });
   if (!left_->adopt(reason)) {
     fatalError("Error: Unable to become the parent of what the model's processes leave: " + reason);
@@ -312,6 +314,11 @@ void PosixProcessLauncher::startItem(Slot& slot) {
   slot.failure = {BatchFailure::Kind::couldNotStart, process.error,
                   fmt::format("{} could not be {}: {}{}", baseName(command.file()), process.failedStep,
                               std::strerror(process.error), hint)};
+}
+
+void PosixProcessLauncher::excludeTime(double seconds) {
+  const double now = clock_();
+  for (Slot& slot : slots_) slot.started = std::min(slot.started + seconds, now);
 }
 
 void PosixProcessLauncher::isExecuting(int slotNumber, std::int32_t& executing, std::int32_t& status) {

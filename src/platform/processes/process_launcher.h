@@ -92,6 +92,8 @@ class ProcessLauncher {
 
   /// Waits until a running batch has changed its state, a signal arrives, or `seconds` have passed.
   virtual void waitForChange(double seconds) = 0;
+  /// Time that the program has just spent otherwise does not count as that of the batches that are running.
+  virtual void excludeTime(double seconds) { static_cast<void>(seconds); }
 
   /// Ends every process that was started and is still running, and returns when they are gone.
   virtual void haltProcesses() = 0;
