@@ -88,7 +88,7 @@ class EvaluationTest : public testing::Test {
 
   /// Evaluations of an earlier run: the set's value by number, those with a negative one failed. Early versions kept no
   /// pairs.
-  void takeUp(const std::map<int, double>& values, bool keptPairs = true) {
+  void takeUp(const std::map<int, double>& values, bool keptPairs = true, int repeated = 0) {
     aggregator_ = std::make_unique<ObjectiveAggregator>(description_.objectives, method_);
     std::map<int, EarlierEvaluations::Record> records;
     for (const auto& [number, value] : values) {
@@ -96,6 +96,7 @@ class EvaluationTest : public testing::Test {
       const double measure = std::abs(value) - 1.0;
       record.parameterValues = {std::abs(value)};
       record.result = {.measureValues = {measure}, .objectiveValues = {std::abs(measure)}};
+      record.repeatsRun = number == repeated;
       if (keptPairs) record.result.pairs = {{.count = 5}};
       if (value < 0) record.result.failure = EvaluationFailure{EvaluationFailure::Kind::signal, "in the past", {}};
     }

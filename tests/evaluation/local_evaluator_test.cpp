@@ -388,6 +388,16 @@ TEST_F(LocalEvaluatorTest, ARunWhoseOutputFilesCouldNotBeKeptIsMadeAgainForThemA
   }
 }
 
+/// Without the last line end, a run waits for the first successful one, which may have to be repeated, too.
+TEST_F(LocalEvaluatorTest, RunsThatAreMadeAgainAreMadeInTheOrderOfTheirNumbers) {
+  FakeLauncher launcher([&](int, const std::string&) { return computes(1.0); });
+  takeUp({{1, 2.0}, {2, 2.0}}, true, 1);
+  earlier_->runAgain({2});
+  evaluate(makeEvaluator(launcher, 1, 10), {2.0, 2.0});
+  std::erase_if(observer_.events, [](const std::string& event) { return event.find("initiated") == event.npos; });
+  EXPECT_THAT(observer_.events, ElementsAre(HasSubstr("No. 1 "), HasSubstr("No. 2 ")));
+}
+
 TEST_F(LocalEvaluatorTest, AnotherSetUnderTheSameNumberIsNoReplay) {
   FakeLauncher launcher([&](int, const std::string&) { return computes(1.0); });
   takeUp({{2, 3.0}});
