@@ -436,8 +436,12 @@ bool ModelRunner::mayBeCutOff(const EvaluationResult& result) const {
 
 void ModelRunner::keepOutputFiles(int slot, int number, EvaluationResult& result) const {
   for (UnkeptFile& file : savedFiles_.save(launcher_.getProcessFolder(slot), number)) {
-    result.warnings.push_back(file.reason);
-    if (!file.isModelsDoing) result.unkeptFiles.push_back(std::move(file));
+    if (file.isModelsDoing) {
+      result.absentFiles.push_back(std::move(file));
+    } else {
+      result.warnings.push_back(file.reason);
+      result.unkeptFiles.push_back(std::move(file));
+    }
   }
 }
 

@@ -269,14 +269,15 @@ TEST_F(LocalEvaluatorTest, AModelWhoseMeasuresNeverChangeIsToldOfOnce) {
     for (std::size_t i = 0; i < batches.size(); ++i) {
       observer_.events.clear();
       evaluate(evaluator, batches[i], i + 1 == batches.size() ? DispatchMode::finalRun : DispatchMode::task);
-      const bool isWarned = observer_.events.back().starts_with("warning: ");
+      const bool isWarned = observer_.events.back().starts_with("warning at once: ");
       EXPECT_EQ(isWarned, i + 1 == warnedAfter) << i << observer_.events.back();
       if (!isWarned) continue;
-      EXPECT_EQ(observer_.events.back(),
-                fmt::format("warning: {} model runs so far have the same output measures, \"bias\" = 2, though their "
-                            "parameters differ: does the model read parameters.txt, and does it write simulated.csv "
-                            "anew?",
-                            text));
+      EXPECT_EQ(
+          observer_.events.back(),
+          fmt::format("warning at once: {} model runs so far have the same output measures, \"bias\" = 2, though their "
+                      "parameters differ: does the model read parameters.txt, and does it write simulated.csv "
+                      "anew?",
+                      text));
     }
   }
 }

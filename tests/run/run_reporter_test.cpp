@@ -186,6 +186,16 @@ TEST_F(RunReporterTest, ProcessesThatRunsLeaveAreWarnedOfOnceAndCounted) {
             "22 model runs left processes running; the log names those of the first 20");
 }
 
+TEST_F(RunReporterTest, AFileThatRunsLeaveOutIsWarnedOfOnceAndCounted) {
+  for (int i = 1; i <= 22; ++i) reporter_.fileAbsent("/out/a.csv", fmt::format("No. {}: a", i));
+  reporter_.fileAbsent("/b.csv", "No. 23: b");
+  EXPECT_THAT(folder_.read("s.log"), AllOf(HasSubstr("Warning: No. 1: a\n"), HasSubstr("\n   No. 20: a\n"),
+                                           Not(HasSubstr("No. 21")), HasSubstr("Warning: No. 23: b\n")));
+  EXPECT_EQ(state_.log.warningCount(), 2);
+  EXPECT_EQ(reporter_.absentWarning(),
+            "Output files to be kept that model runs have not left: out/a.csv (22 model runs)");
+}
+
 TEST_F(RunReporterTest, AnEvaluationReachesResultFileLogProgressAndTheFileOfFailures) {
   reporter_.message("Evaluation of parameter set No. 1 initiated");
   finish(1, 2.5);
