@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <utility>
 
 #include <fmt/core.h>
 
@@ -254,6 +255,11 @@ void RunReporter::takeBestOf(const SearchSummary& search) {
 
 void RunReporter::considerAsBest(int number, double aggregate, const std::vector<double>& parameterValues,
                                  std::string_view foundAt) {
+  if (aggregate >= kFailedRunValue && !std::exchange(hasWarnedOfAggregate_, true)) {
+    warning(fmt::format("{} succeeded with the aggregate {}: failed ones have {} and count as {}",
+                        progress::nameOfEvaluation(number), formatReal(aggregate), formatReal(kFailedRunValue),
+                        aggregate > kFailedRunValue ? "better" : "good as it"));
+  }
   if (best_.consider(number, aggregate, parameterValues)) state_.progress.progressBest(number, aggregate, foundAt);
 }
 

@@ -122,6 +122,7 @@ class RunReporter final : public EvaluationObserver {
   std::set<int> others_;                 ///< evaluations without such a difference, with pairs of other observations
   std::size_t differencesWarnedOf_ = 0;  ///< one by one
   int runsWithProcessesLeft_ = 0;
+  bool hasWarnedOfAggregate_ = false;    ///< one that is no better than that of a failed evaluation
   std::map<std::string, int> absences_;  ///< model runs that have not left an output file, by its name
 };
 

@@ -55,6 +55,17 @@ TEST_F(RunReporterTest, TheBestIsTheFirstOfEqualsAndNeverAFailure) {
   EXPECT_DOUBLE_EQ(reporter_.best()->parameterValues.at(0), 2.0);
 }
 
+TEST_F(RunReporterTest, ASuccessThatIsNoBetterThanAFailureIsWarnedOfOnce) {
+  finish(1, kFailedRunValue);
+  finish(2, 9e29);
+  EXPECT_EQ(state_.log.warningCount(), 0);
+  finish(3, 2e30);
+  finish(4, 3e30);
+  EXPECT_THAT(state_.log.warnings(),
+              testing::ElementsAre("Evaluation of parameter set No. 3 succeeded with the aggregate 2e+30: failed ones "
+                                   "have 1e+30 and count as better"));
+}
+
 TEST_F(RunReporterTest, TheBestOfASearchIsTheOneThatItTook) {
   finish(1, 5.0);
   finish(2, 5.0, std::log(2.0));
