@@ -45,23 +45,43 @@ std::optional<std::string> EqualMeasures::findIn(std::span<const ParameterSet> s
     std::vector<double> written = valuesAsWritten(fields_, space_, sets[i]);
     if (++runCount_ == 1) {
       measureValues_ = results[i].measureValues;
+      hasChanged_.assign(measureValues_.size(), false);
+      hasVaried_.assign(written.size(), false);
       written_ = std::move(written);
       continue;
     }
-    isSettled_ = results[i].measureValues != measureValues_;
-    if (isSettled_) return std::nullopt;
+    for (std::size_t k = 0; k < measureValues_.size(); ++k) {
+      if (results[i].measureValues[k] != measureValues_[k]) hasChanged_[k] = true;
+    }
+    for (std::size_t j = 0; j < written_.size(); ++j) {
+      if (written[j] != written_[j]) hasVaried_[j] = true;
+    }
     otherCount_ += written != written_ ? 1 : 0;
   }
+  const auto isTrue = [](bool is) { return is; };
+  const bool hasOneChanged = std::any_of(hasChanged_.begin(), hasChanged_.end(), isTrue);
+  isSettled_ = runCount_ > 0 && std::all_of(hasChanged_.begin(), hasChanged_.end(), isTrue);
   const bool isEnough = sets.size() > 1 || otherCount_ + 1 >= kEnoughRuns || isLast;
-  if (otherCount_ == 0 || !isEnough) return std::nullopt;
+  if (isSettled_ || otherCount_ == 0 || !isEnough) return std::nullopt;
+  // One measure may depend on a single parameter, and some tasks change one at a time.
+  if (hasOneChanged && !isLast && !std::all_of(hasVaried_.begin(), hasVaried_.end(), isTrue)) return std::nullopt;
   isSettled_ = true;
-  return warning();
+  return warning(hasOneChanged);
 }
 
-std::string EqualMeasures::warning() const {
+std::string EqualMeasures::warning(bool hasOneChanged) const {
   std::vector<std::string> measures;
+  std::vector<std::string> files;
   for (std::size_t i = 0; i < measures_.size(); ++i) {
+    if (hasChanged_[i]) continue;
     measures.push_back(fmt::format("{} = {}", quotedForMessage(measures_[i]), formatReal(measureValues_[i])));
+    files.push_back(resultFiles_[i]);
+  }
+  if (hasOneChanged) {
+    return fmt::format(
+        "All {} successful model runs so far have the same {}, though their parameters differ and other output "
+        "measures change: is {} what is to be read, and does the model write it anew?",
+        runCount_, listOf(measures), listOf(files));
   }
   return fmt::format(
       "All {} successful model runs so far have the same output measures, {}, though their parameters differ: does the "

@@ -12,8 +12,9 @@
 
 namespace mirevo {
 
-/// Notices that a model ignores its parameters: all its successful runs have the same measures, though the
-/// values that it got differ. What it finds depends on the batches alone, not on the order in which model runs end.
+/// Notices that a model ignores its parameters: all its successful runs have the same measures, or the same value of
+/// some, though the values that it got differ. What it finds depends on the batches alone, not on the order in which
+/// model runs end.
 class EqualMeasures final {
  public:
   /// Never finds anything.
@@ -23,13 +24,14 @@ class EqualMeasures final {
   EqualMeasures(SearchSpace space, ParameterFields fields, std::vector<std::string> measures,
                 std::vector<std::string> parameterFiles, std::vector<std::string> resultFiles);
 
-  /// Takes a complete batch; returns a warning, once in a run, if the measures have not changed by the end of a sample,
-  /// of twenty successful runs or, with `isLast`, of the run.
+  /// Takes a complete batch; returns a warning, once in a run, if measures have not changed by the end of a sample,
+  /// of twenty successful runs or, with `isLast`, of the run. If others have, it waits until every value has differed
+  /// that the model gets.
   std::optional<std::string> findIn(std::span<const ParameterSet> sets, std::span<const EvaluationResult> results,
                                     bool isLast);
 
  private:
-  std::string warning() const;
+  std::string warning(bool hasOneChanged) const;
 
   SearchSpace space_;
   ParameterFields fields_;
@@ -40,6 +42,8 @@ class EqualMeasures final {
   int runCount_ = 0;                   ///< successful ones
   std::vector<double> written_;        ///< what the model got in the first successful run
   std::vector<double> measureValues_;  ///< of the same
+  std::vector<bool> hasVaried_;        ///< by what the model got, whether another run got something else
+  std::vector<bool> hasChanged_;       ///< by measure, whether another run had another value
   int otherCount_ = 0;                 ///< successful runs in which it got something else
 };
 

@@ -83,6 +83,9 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
   for (const std::string& text : result.warnings) {
     observer_.warning(progress::nameOfEvaluation(result.number) + ": " + text);
   }
+  for (const UnkeptFile& file : result.absentFiles) {
+    observer_.fileAbsent(file.name, progress::nameOfEvaluation(result.number) + ": " + file.reason);
+  }
   std::string_view outcome = progress::kOk;
   if (!result.ok()) {
     // A set that cannot be run is no model run error, even if it is an equation that has no finite value.
@@ -150,7 +153,7 @@ void EvaluationLedger::warnOfUnusedObservations(const EvaluationResult& result) 
 }
 
 std::vector<EvaluationResult> EvaluationLedger::end() {
-  if (const auto text = equalMeasures_.findIn(sets_, results_, isFinalRun_)) observer_.warning(*text);
+  if (const auto text = equalMeasures_.findIn(sets_, results_, isFinalRun_)) observer_.urgentWarning(*text);
   return close();
 }
 

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <span>
+#include <string>
 #include <string_view>
 
 #include "common/parameter_set.h"
@@ -21,8 +22,16 @@ class EvaluationObserver {
   virtual void message(std::string_view text) = 0;
   /// A warning for the log alone.
   virtual void warning(std::string_view text) = 0;
+  /// A warning for the log that the user gets at once, too: the run may be in vain.
+  virtual void urgentWarning(std::string_view text) { warning(text); }
   /// A model run has left processes that had to be ended; `text` names the evaluation and them.
   virtual void processesLeft(std::string_view text) { warning(text); }
+  /// A model run has not left an output file that is to be kept; `text` names the evaluation and says why. `name`: the
+  /// file below the base folder, with its leading "/".
+  virtual void fileAbsent(const std::string& name, std::string_view text) {
+    static_cast<void>(name);
+    warning(text);
+  }
   /// Writes a finished evaluation to disk. Called before anything reports its end, so that nothing is reported as done
   /// that a full disk or a kill could still destroy.
   virtual void recordEvaluation(std::span<const double> set, const EvaluationResult& result) {

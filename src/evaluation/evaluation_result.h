@@ -112,6 +112,7 @@ struct EvaluationResult {
   std::vector<std::string> lastOutput;
   std::vector<std::string> warnings;    ///< warnings for the log, one line each
   std::vector<UnkeptFile> unkeptFiles;  ///< output files that the model run has left and that could not be kept
+  std::vector<UnkeptFile> absentFiles;  ///< output files that are to be kept and that the model run has not left
 
   bool ok() const { return !failure.has_value(); }
   /// Makes a successful result a failed one.

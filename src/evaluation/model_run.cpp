@@ -445,8 +445,12 @@ void ModelRunner::keepOutputFiles(int slot, int number, EvaluationResult& result
     return;
   }
   for (UnkeptFile& file : savedFiles_.save(launcher_.getProcessFolder(slot), number, isRepeated)) {
-    result.warnings.push_back(file.reason);
-    if (!file.isModelsDoing) result.unkeptFiles.push_back(std::move(file));
+    if (file.isModelsDoing) {
+      result.absentFiles.push_back(std::move(file));
+    } else {
+      result.warnings.push_back(file.reason);
+      result.unkeptFiles.push_back(std::move(file));
+    }
   }
 }
 

@@ -557,6 +557,7 @@ void RunDriver::logDifferences() {
   reporter_->settle(*aggregator_);
   for (const std::string& text : reporter_->differenceWarnings()) state_.log.warning(text);
   if (const std::string text = reporter_->unkeptWarning(); !text.empty()) state_.log.warning(text);
+  if (const std::string text = reporter_->absentWarning(); !text.empty()) state_.log.warning(text);
   for (const std::string& text : reporter_->differencesOfBest()) state_.log.warning(text);
   if (const auto text = reporter_->processesLeftWarning()) state_.log.warning(*text);
 }

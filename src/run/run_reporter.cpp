@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <utility>
 
 #include <fmt/core.h>
 
@@ -10,13 +11,14 @@
 #include "common/progress_messages.h"
 #include "common/run_files.h"
 #include "common/text.h"
+#include "platform/terminal/front_end.h"
 
 namespace mirevo {
 namespace {
 
 /// Of each kind in the result file; as warnings in the log, behind which the others are plain lines.
 constexpr std::size_t kMostDifferencesShown = 20;
-/// Model runs whose processes the log names.
+/// Model runs of which the log says that they left processes, or left a file out.
 constexpr int kMostLeftShown = 20;
 
 const DifferenceTexts& textsOf(RunDifference::Kind kind) {
@@ -48,6 +50,11 @@ void RunReporter::warning(std::string_view text) {
   state_.log.warning(text);
 }
 
+void RunReporter::urgentWarning(std::string_view text) {
+  state_.log.warning(text);
+  showMessage(text, {}, MessageType::warning);
+}
+
 /// The first one is warned of, some more are plain lines, and the others are counted alone.
 void RunReporter::processesLeft(std::string_view text) {
   ++runsWithProcessesLeft_;
@@ -63,6 +70,28 @@ std::optional<std::string> RunReporter::processesLeftWarning() const {
   return fmt::format(
       "{} model runs left processes running; the log names {}", runsWithProcessesLeft_,
       runsWithProcessesLeft_ <= kMostLeftShown ? "them" : fmt::format("those of the first {}", kMostLeftShown));
+}
+
+/// Of each file, as those model runs are often all of them.
+void RunReporter::fileAbsent(const std::string& name, std::string_view text) {
+  const int count = ++absences_[name];
+  if (count == 1) {
+    state_.log.warning(text);
+  } else if (count <= kMostLeftShown) {
+    state_.log.line("   " + std::string(text));
+  }
+}
+
+std::string RunReporter::absentWarning() const {
+  constexpr std::size_t kMostNamed = 5;
+  std::size_t count = 0;
+  std::string list;
+  for (const auto& [name, runs] : absences_) {
+    if (runs <= 1 || ++count > kMostNamed) continue;
+    list += fmt::format("{}{} ({} model runs)", list.empty() ? "" : ", ", name.substr(1), runs);
+  }
+  if (count > kMostNamed) list += fmt::format(" and {} more", count - kMostNamed);
+  return list.empty() ? list : "Output files to be kept that model runs have not left: " + list;
 }
 
 void RunReporter::recordEvaluation(std::span<const double> set, const EvaluationResult& result) {
@@ -226,6 +255,11 @@ void RunReporter::takeBestOf(const SearchSummary& search) {
 
 void RunReporter::considerAsBest(int number, double aggregate, const std::vector<double>& parameterValues,
                                  std::string_view foundAt) {
+  if (aggregate >= kFailedRunValue && !std::exchange(hasWarnedOfAggregate_, true)) {
+    warning(fmt::format("{} succeeded with the aggregate {}: failed ones have {} and count as {}",
+                        progress::nameOfEvaluation(number), formatReal(aggregate), formatReal(kFailedRunValue),
+                        aggregate > kFailedRunValue ? "better" : "good as it"));
+  }
   if (best_.consider(number, aggregate, parameterValues)) state_.progress.progressBest(number, aggregate, foundAt);
 }
 

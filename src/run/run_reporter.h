@@ -38,7 +38,9 @@ class RunReporter final : public EvaluationObserver {
 
   void message(std::string_view text) override;
   void warning(std::string_view text) override;
+  void urgentWarning(std::string_view text) override;
   void processesLeft(std::string_view text) override;
+  void fileAbsent(const std::string& name, std::string_view text) override;
   void recordEvaluation(std::span<const double> set, const EvaluationResult& result) override;
   bool readsSimulatedValues() const override { return simulatedValues_ != nullptr && simulatedValues_->isReadBack(); }
   void recordUnkeptFiles(int number, std::span<const UnkeptFile> files) override;
@@ -70,6 +72,8 @@ class RunReporter final : public EvaluationObserver {
   std::vector<std::string> differencesOfBest() const;
   /// A sentence that says how many model runs left processes running, if there was more than one.
   std::optional<std::string> processesLeftWarning() const;
+  /// Names the output files that several model runs have not left, and how many; empty if there are none.
+  std::string absentWarning() const;
   /// The first successful run and the evaluations that differ or have other pairs; empty as long as it is not known
   /// which is the first successful one.
   std::set<int> numbersWithPairs() const;
@@ -118,6 +122,8 @@ class RunReporter final : public EvaluationObserver {
   std::set<int> others_;                 ///< evaluations without such a difference, with pairs of other observations
   std::size_t differencesWarnedOf_ = 0;  ///< one by one
   int runsWithProcessesLeft_ = 0;
+  bool hasWarnedOfAggregate_ = false;    ///< one that is no better than that of a failed evaluation
+  std::map<std::string, int> absences_;  ///< model runs that have not left an output file, by its name
 };
 
 }  // namespace mirevo

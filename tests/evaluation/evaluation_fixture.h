@@ -24,6 +24,7 @@ class RecordingObserver final : public EvaluationObserver {
  public:
   void message(std::string_view text) override { events.emplace_back(text); }
   void warning(std::string_view text) override { events.push_back("warning: " + std::string(text)); }
+  void urgentWarning(std::string_view text) override { events.push_back("warning at once: " + std::string(text)); }
   void evaluationFinished(std::span<const double> set, const EvaluationResult& result) override {
     events.push_back(fmt::format("record {} a={} {}", result.number, set[0], result.ok() ? "OK" : "FAILED"));
   }

@@ -269,15 +269,42 @@ TEST_F(LocalEvaluatorTest, AModelWhoseMeasuresNeverChangeIsToldOfOnce) {
     for (std::size_t i = 0; i < batches.size(); ++i) {
       observer_.events.clear();
       evaluate(evaluator, batches[i], i + 1 == batches.size() ? DispatchMode::finalRun : DispatchMode::task);
-      const bool isWarned = observer_.events.back().starts_with("warning: ");
+      const bool isWarned = observer_.events.back().starts_with("warning at once: ");
       EXPECT_EQ(isWarned, i + 1 == warnedAfter) << i << observer_.events.back();
       if (!isWarned) continue;
-      EXPECT_EQ(observer_.events.back(),
-                fmt::format("warning: {} model runs so far have the same output measures, \"bias\" = 2, though their "
-                            "parameters differ: does the model read parameters.txt, and does it write simulated.csv "
-                            "anew?",
-                            text));
+      EXPECT_EQ(
+          observer_.events.back(),
+          fmt::format("warning at once: {} model runs so far have the same output measures, \"bias\" = 2, though their "
+                      "parameters differ: does the model read parameters.txt, and does it write simulated.csv "
+                      "anew?",
+                      text));
     }
+  }
+}
+
+TEST_F(LocalEvaluatorTest, OneMeasureOfSeveralThatNeverChangesIsToldOf) {
+  description_.measures.push_back(description_.measures.front());
+  folder_.write("base/gauge.csv", series(0.0));
+  description_.measures.back().name = "gauge";
+  description_.measures.back().simulation.fileName = folder_ / "base/gauge.csv";
+  description_.objectives.front().measures = {0, 1};
+  for (const bool changes : {false, true}) {
+    FakeLauncher launcher([&](int start, const std::string&) {
+      FakeLauncher::Batch batch = computes(1.0);
+      batch.write = [start, changes, simulated = batch.write](const std::string& folder) {
+        simulated(folder);
+        std::ofstream(folder + "/gauge.csv") << series(changes && start == 2 ? 4.0 : 3.0);
+      };
+      return batch;
+    });
+    LocalEvaluator& evaluator = makeEvaluator(launcher, 1, 100);
+    observer_.events.clear();
+    evaluate(evaluator, {0, 1, 2});
+    evaluate(evaluator, {3, 4});
+    const std::string text =
+        "warning at once: All 3 successful model runs so far have the same \"gauge\" = 2, though their parameters "
+        "differ and other output measures change: is gauge.csv what is to be read, and does the model write it anew?";
+    EXPECT_EQ(std::count(observer_.events.begin(), observer_.events.end(), text), changes ? 0 : 1);
   }
 }
 

@@ -203,14 +203,14 @@ TEST_F(ModelRunTest, SavedFilesAreThoseThatTheRunWrote) {
   description_.savedFolder = folder_ / "run_Saved";
   makeRunner(launcher_, 1);
   const auto notKept = [this](const std::string& name) {
-    return StartsWith((folder_ / "run_Process1") + "/" + name + " was not kept: ");
+    return testing::Field(&UnkeptFile::reason, StartsWith((folder_ / "run_Process1") + "/" + name + " was not kept: "));
   };
   // Before the first run the file is the base folder's copy, before the second the first run's.
   writes("simulated.csv", series(4.0));
   for (const int number : {1, 4}) {
     EvaluationResult result = evaluate(2.0 + number);
     runner_->keepOutputFiles(1, number, result);
-    EXPECT_THAT(result.warnings, ElementsAre(notKept("out/state.txt"), notKept("none.txt")));
+    EXPECT_THAT(result.absentFiles, ElementsAre(notKept("out/state.txt"), notKept("none.txt")));
     const std::string folder = fmt::format("run_Saved/{}/", number);
     EXPECT_EQ(folder_.read(folder + "simulated.csv"), series(4.0));
     EXPECT_THAT(folder_.read(folder + "parameters.txt"), EndsWith(fmt::format(" {}\n", 2 + number)));
@@ -247,7 +247,7 @@ TEST_F(ModelRunTest, AFileBehindALinkOutOfTheProcessFolderIsNeitherReadNorKept) 
     EXPECT_EQ(result.failure->kind, Kind::resultsNotReadable);
     EXPECT_THAT(result.failure->reason,
                 StartsWith(file + ": the link " + file + " leads to " + (folder_ / "shared/simulated.csv")));
-    EXPECT_THAT(result.warnings, ElementsAre(StartsWith(file + " was not kept: the link ")));
+    EXPECT_THAT(result.absentFiles.at(0).reason, StartsWith(file + " was not kept: the link "));
   }
   EXPECT_EQ(folder_.read("shared/simulated.csv"), series(4.0));
 }

@@ -55,6 +55,12 @@ TEST_F(RunReporterTest, TheBestIsTheFirstOfEqualsAndNeverAFailure) {
   EXPECT_DOUBLE_EQ(reporter_.best()->parameterValues.at(0), 2.0);
 }
 
+TEST_F(RunReporterTest, ASuccessThatIsNoBetterThanAFailureIsWarnedOfOnce) {
+  for (int number = 1; const double aggregate : {kFailedRunValue, 9e29, 2e30, 3e30}) finish(number++, aggregate);
+  EXPECT_THAT(state_.log.warnings(),
+              testing::ElementsAre(HasSubstr("No. 3 succeeded with the aggregate 2e+30: failed ones have 1e+30 and")));
+}
+
 TEST_F(RunReporterTest, TheBestOfASearchIsTheOneThatItTook) {
   finish(1, 5.0);
   finish(2, 5.0, std::log(2.0));
@@ -184,6 +190,16 @@ TEST_F(RunReporterTest, ProcessesThatRunsLeaveAreWarnedOfOnceAndCounted) {
   EXPECT_EQ(state_.log.warningCount(), 1);
   EXPECT_EQ(reporter_.processesLeftWarning(),
             "22 model runs left processes running; the log names those of the first 20");
+}
+
+TEST_F(RunReporterTest, AFileThatRunsLeaveOutIsWarnedOfOnceAndCounted) {
+  for (int i = 1; i <= 22; ++i) reporter_.fileAbsent("/out/a.csv", fmt::format("No. {}: a", i));
+  reporter_.fileAbsent("/b.csv", "No. 23: b");
+  EXPECT_THAT(folder_.read("s.log"), AllOf(HasSubstr("Warning: No. 1: a\n"), HasSubstr("\n   No. 20: a\n"),
+                                           Not(HasSubstr("No. 21")), HasSubstr("Warning: No. 23: b\n")));
+  EXPECT_EQ(state_.log.warningCount(), 2);
+  EXPECT_EQ(reporter_.absentWarning(),
+            "Output files to be kept that model runs have not left: out/a.csv (22 model runs)");
 }
 
 TEST_F(RunReporterTest, AnEvaluationReachesResultFileLogProgressAndTheFileOfFailures) {

@@ -17,6 +17,11 @@ constexpr int kFewestStartPoints = 5;
 /// Perturbations of the same parameters that are drawn, while none can be run, before other parameters are chosen.
 constexpr int kDrawsPerChoice = 10;
 
+/// A parameter counts as held if so many of its steps were replaced, and none that was made is larger than this share
+/// of their standard deviation. Five free steps are all as small in one of 10^12 searches.
+constexpr int kEnoughSteps = 5;
+constexpr double kHeldStep = 0.005;
+
 bool isUsable(const SearchBounds& bounds) {
   if (bounds.lower.empty() || bounds.upper.size() != bounds.size()) return false;
   for (std::size_t j = 0; j < bounds.size(); ++j) {
@@ -64,6 +69,8 @@ SearchStatus Dds::initialise() {
   if (maxEvaluations_ < 1 || !isUsable(bounds_)) return kDdsInvalidInput;
   if (startFromInitial_ && bounds_.initial.size() != bounds_.size()) return kDdsInvalidInput;
   summary_ = {};
+  replacedSteps_.assign(bounds_.size(), 0);
+  largestSteps_.assign(bounds_.size(), 0.0);
   std::vector<ParameterSet> points = startPoints();
   feasible_.replaceInSample(points, startFromInitial_ ? 1 : 0, bounds_, random_);
   std::vector<EvaluationResult> results = evaluator_.evaluateParameterSets(points, DispatchMode::task);
@@ -82,8 +89,11 @@ SearchStatus Dds::advance() {
   if (isTerminated()) return kSearchOk;
   if (summary_.evaluationCount == 0) return kDdsInvalidInput;
   const double probability = ddsInclusionProbability(summary_.evaluationCount + 1, maxEvaluations_);
+  ParameterSet firstDraw;
   const ParameterSet candidate = ddsCandidate(
-      summary_.best, bounds_, settings_.perturbation, probability, [this] { return random_.next(); }, feasible_);
+      summary_.best, bounds_, settings_.perturbation, probability, [this] { return random_.next(); }, feasible_,
+      &firstDraw);
+  noteSteps(firstDraw, candidate);
   std::vector<EvaluationResult> results = evaluator_.evaluateParameterSets({&candidate, 1}, DispatchMode::task);
   ++summary_.evaluationCount;
   ++summary_.loopCount;
@@ -110,7 +120,24 @@ void Dds::takeAsBest(const ParameterSet& set, EvaluationResult& result) {
   summary_.bestResult = std::move(result);
 }
 
+void Dds::noteSteps(const ParameterSet& firstDraw, const ParameterSet& candidate) {
+  for (std::size_t j = 0; j < candidate.size(); ++j) {
+    if (firstDraw[j] != summary_.best[j] && firstDraw[j] != candidate[j]) ++replacedSteps_[j];
+    largestSteps_[j] = std::max(largestSteps_[j], std::abs(candidate[j] - summary_.best[j]));
+  }
+}
+
+std::vector<std::size_t> Dds::heldParameters() const {
+  std::vector<std::size_t> held;
+  for (std::size_t j = 0; j < bounds_.size(); ++j) {
+    const double smallest = kHeldStep * settings_.perturbation * (bounds_.upper[j] - bounds_.lower[j]);
+    if (replacedSteps_[j] >= kEnoughSteps && largestSteps_[j] <= smallest) held.push_back(j);
+  }
+  return held;
+}
+
 void Dds::checkBudget() {
+  summary_.heldParameters = heldParameters();
   summary_.replacedCount = feasible_.replacedCount();
   summary_.returnedCount = feasible_.returnedCount();
   if (summary_.evaluationCount >= maxEvaluations_) {
@@ -156,7 +183,8 @@ double ddsReflect(double value, double lower, double upper) {
 }
 
 ParameterSet ddsCandidate(std::span<const double> best, const SearchBounds& bounds, double r,
-                          double inclusionProbability, const DeviateSource& deviate, FeasiblePoints& feasible) {
+                          double inclusionProbability, const DeviateSource& deviate, FeasiblePoints& feasible,
+                          ParameterSet* firstDraw) {
   std::vector<std::size_t> chosen;
   int draws = 0;
   const auto draw = [&] {
@@ -167,6 +195,7 @@ ParameterSet ddsCandidate(std::span<const double> best, const SearchBounds& boun
       const double perturbed = best[j] + r * range * ddsNormalDeviate(deviate);
       candidate[j] = ddsReflect(perturbed, bounds.lower[j], bounds.upper[j]);
     }
+    if (firstDraw != nullptr && draws == 1) *firstDraw = candidate;
     return candidate;
   };
   return feasible.draw(draw, best);

@@ -41,6 +41,8 @@ class Dds final : public SearchAlgorithm {
   std::vector<ParameterSet> startPoints();
   void takeAsBest(const ParameterSet& set, EvaluationResult& result);
   void checkBudget();
+  void noteSteps(const ParameterSet& firstDraw, const ParameterSet& candidate);
+  std::vector<std::size_t> heldParameters() const;
 
   DdsSettings settings_;
   int maxEvaluations_;
@@ -50,6 +52,8 @@ class Dds final : public SearchAlgorithm {
   UniformGenerator& random_;
   FeasiblePoints feasible_;
   SearchSummary summary_;
+  std::vector<int> replacedSteps_;    ///< by parameter, how many of its steps could not be run and were replaced
+  std::vector<double> largestSteps_;  ///< by parameter, from the best set to a candidate
 };
 
 inline constexpr SearchStatus kDdsInvalidInput = 1;
@@ -73,9 +77,10 @@ double ddsReflect(double value, double lower, double upper);
 /// The best set with each parameter perturbed with the given probability, and at least one of them in any case; r is
 /// the standard deviation of the perturbation as a fraction of the range of the parameter. While the set cannot be run,
 /// the perturbations are drawn again, and after every ten draws the parameters, too; FeasiblePoints::draw() then draws
-/// the set back towards the best one.
+/// the set back towards the best one. `firstDraw`, if any, gets what was drawn first.
 ParameterSet ddsCandidate(std::span<const double> best, const SearchBounds& bounds, double r,
-                          double inclusionProbability, const DeviateSource& deviate, FeasiblePoints& feasible);
+                          double inclusionProbability, const DeviateSource& deviate, FeasiblePoints& feasible,
+                          ParameterSet* firstDraw = nullptr);
 
 /// DDS as a setup selects it.
 class DdsMethod final : public SearchMethod {

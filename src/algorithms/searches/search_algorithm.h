@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <string>
 #include <vector>
@@ -20,8 +21,11 @@ struct SearchSummary {
   EvaluationResult bestResult;
   int evaluationCount = 0;  ///< model evaluations made, failed ones included
   int loopCount = 0;
-  int replacedCount = 0;           ///< proposals that could not be run and were replaced before their evaluation
-  int returnedCount = 0;           ///< those of them that could only be replaced by a set already evaluated
+  int replacedCount = 0;  ///< proposals that could not be run and were replaced before their evaluation
+  int returnedCount = 0;  ///< those of them that could only be replaced by a set already evaluated
+  /// Parameters that proposals would have changed and that stayed (nearly) where they were, as these proposals could
+  /// not be run and were replaced by others.
+  std::vector<std::size_t> heldParameters;
   double populationSpread = 0.0;   ///< search scale; populationSpread() of a search with a population
   double populationRange = 0.0;    ///< normalisedPopulationRange() of a search with a population
   std::string terminationMessage;  ///< empty while it runs

@@ -52,7 +52,7 @@ struct Layout<EvaluationResult> {
   static void of(auto& archive, auto& result) {
     archive(result.measureValues, result.objectiveValues, result.aggregate, result.exactMeasures,
             result.simulatedValues, result.failure, result.unusedObservations, result.pairs, result.lastOutput,
-            result.warnings, result.unkeptFiles, result.shownSeries);
+            result.warnings, result.unkeptFiles, result.absentFiles, result.shownSeries);
   }
 };
 template <>

@@ -49,7 +49,7 @@ RecordFile::~RecordFile() {
 }
 
 void RecordFile::open(const std::string& path) {
-  openWith(path, O_CREAT | O_TRUNC);
+  openWith(path, O_CREAT | O_TRUNC | O_APPEND);
 }
 
 void RecordFile::openToContinue(const std::string& path) {
@@ -76,9 +76,11 @@ void RecordFile::openWith(const std::string& path, int flags) {
   if (descriptor_ < 0) fatalError("Error: Unable to open " + path, std::strerror(errno));
 }
 
-void RecordFile::append(std::string_view record) {
+bool RecordFile::append(std::string_view record) {
+  if (failed_) return false;
   std::string reason;
-  if (!failed_ && !tryAppend(record, reason)) fatalError("Error: Unable to write to " + path_, reason);
+  if (!tryAppend(record, reason)) fatalError("Error: Unable to write to " + path_, reason);
+  return true;
 }
 
 bool RecordFile::tryAppend(std::string_view record, std::string& reason) {
@@ -92,15 +94,41 @@ bool RecordFile::tryAppend(std::string_view record, std::string& reason) {
     failed_ = true;
     return false;
   }
-  if (const int error = writeWhole(descriptor_, record).error; error != 0) {
+  const std::int64_t before = size_;
+  if (!takeUpSize(reason)) {
+    failed_ = true;
+    return false;
+  }
+  // Behind half a line of another program the record would be lost to readers.
+  const bool needsLineEnd = size_ > before && record.ends_with('\n') && !endsLine();
+  int error = needsLineEnd ? writeWhole(descriptor_, "\n").error : 0;
+  if (error == 0) error = writeWhole(descriptor_, record).error;
+  if (error != 0) {
     reason = std::strerror(error);
     failed_ = true;
     // Removes the part that was written: readers of the file would take it for a record.
     if (::ftruncate(descriptor_, size_) != 0 && errno != EINVAL) reason += ", and its last line is cut off";
     return false;
   }
-  size_ += static_cast<std::int64_t>(record.size());
+  size_ += static_cast<std::int64_t>(record.size()) + (needsLineEnd ? 1 : 0);
   return true;
+}
+
+bool RecordFile::takeUpSize(std::string& reason) {
+  struct stat status {};
+  if (::fstat(descriptor_, &status) != 0 || !S_ISREG(status.st_mode)) return true;
+  if (status.st_size < size_) {
+    reason = shortenedText(size_, status.st_size);
+    return false;
+  }
+  size_ = status.st_size;
+  return true;
+}
+
+bool RecordFile::endsLine() const {
+  char last = '\n';
+  std::string ignored;
+  return size_ == 0 || !tryRead(size_ - 1, &last, 1, ignored) || last == '\n';
 }
 
 bool RecordFile::tryRead(std::int64_t offset, char* bytes, std::size_t size, std::string& reason) const {
@@ -129,13 +157,21 @@ void RecordFile::close() {
 }
 
 bool RecordFile::tryClose(std::string& reason) {
+  if (descriptor_ < 0) return true;
+  const bool isWhole = failed_ || takeUpSize(reason);  // a failure has been told
   const int descriptor = std::exchange(descriptor_, -1);
-  if (descriptor < 0) return true;
   // What the system has taken may still fail on its way to the disk, and only this call tells of it.
   const int lost = ::fsync(descriptor) == 0 || errno == EINVAL || errno == EINTR ? 0 : errno;
   const int error = ::close(descriptor) == 0 || errno == EINTR ? lost : errno;
-  if (error != 0) reason = std::strerror(error);
-  return error == 0;
+  if (error != 0 && isWhole) reason = std::strerror(error);
+  return error == 0 && isWhole;
+}
+
+std::string shortenedText(std::int64_t from, std::int64_t to) {
+  return fmt::format(
+      "another program has shortened it, from {} to {} bytes. With Restart = 1 the setup goes on from what is left and "
+      "makes lost evaluations again",
+      from, to);
 }
 
 std::vector<NumberedEntry> numberedEntries(const std::string& prefix, std::string_view extension) {

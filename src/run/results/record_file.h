@@ -9,7 +9,8 @@
 namespace mirevo {
 
 /// A file that grows record by record: each record has been passed to the system when the call returns, and a record
-/// that does not fit on the disk leaves no part of itself behind.
+/// that does not fit on the disk leaves no part of itself behind. A file that another program has shortened takes no
+/// more records; what another program has appended stays.
 class RecordFile final {
  public:
   RecordFile() = default;
@@ -27,14 +28,14 @@ class RecordFile final {
   void openToContinue(const std::string& path, const std::string& content);
 
   /// Appends `record` unchanged, line ends included. Throws FatalError with the system's reason, once: after a failure
-  /// further records are dropped.
-  void append(std::string_view record);
+  /// further records are dropped. False for one that is.
+  bool append(std::string_view record);
 
   /// Like append(), for the end of a run that has failed already: returns false, with the system's reason, instead of
   /// throwing.
   bool tryAppend(std::string_view record, std::string& reason);
 
-  /// Throws FatalError with the system's reason if not everything written has reached the disk.
+  /// Throws FatalError with the reason if not everything written has reached the disk and is still there.
   void close();
   /// Reads bytes written before, `size` of them from `offset` on. False, with the reason, if that fails.
   bool tryRead(std::int64_t offset, char* bytes, std::size_t size, std::string& reason) const;
@@ -46,10 +47,13 @@ class RecordFile final {
   bool isOpen() const { return descriptor_ >= 0; }
   const std::string& path() const { return path_; }
   int descriptor() const { return descriptor_; }
-  /// Bytes written so far.
+  /// Bytes up to the end of the last record; it begins its own length before.
   std::int64_t size() const { return size_; }
 
  private:
+  /// Takes up what other programs have appended. False, with the reason, if one of them has shortened the file.
+  bool takeUpSize(std::string& reason);
+  bool endsLine() const;
   void openWith(const std::string& path, int flags);
 
   std::string path_;
@@ -57,6 +61,9 @@ class RecordFile final {
   std::int64_t size_ = 0;
   bool failed_ = false;
 };
+
+/// That another program has shortened a file, and what to do.
+std::string shortenedText(std::int64_t from, std::int64_t to);
 
 /// Something whose name is `prefix`, digits and `extension`.
 struct NumberedEntry {

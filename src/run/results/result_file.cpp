@@ -64,9 +64,9 @@ void ResultFile::addRow(const ResultRow& row) {
   const std::string line = resultRowText(row);
   const std::uint64_t checksum = checksumOf(line);
   checksums_.add({row.number, checksum});  // before the row, which would be taken for damaged without it
-  const std::int64_t offset = file_.size();
-  file_.append(line + '\n');
-  rows_.push_back({row.number, offset, std::ssize(line) + 1, checksum});
+  if (!file_.append(line + '\n')) return;
+  const std::int64_t length = std::ssize(line) + 1;
+  rows_.push_back({row.number, file_.size() - length, length, checksum});
 }
 
 void ResultFile::replaceAggregate(int number, double aggregate) {
@@ -119,13 +119,27 @@ std::vector<RowChecksum> ResultFile::checksumsOfRows() const {
   return checksums;
 }
 
+/// What other programs have appended during the run.
+std::string ResultFile::linesOfOthers(std::string_view content) const {
+  std::string lines;
+  std::int64_t end = headLength_;
+  for (const Place& place : rows_) {
+    lines += content.substr(static_cast<std::size_t>(end), static_cast<std::size_t>(place.offset - end));
+    end = place.offset + place.length;
+  }
+  lines += content.substr(static_cast<std::size_t>(end));
+  if (!lines.empty() && !lines.ends_with('\n')) lines += '\n';
+  return lines;
+}
+
 bool ResultFile::rewriteInOrder(std::string_view closing, std::string& reason) {
   const auto content = readTextFile(path(), reason);
   if (!content) return false;
   if (std::ssize(*content) < file_.size()) {
-    reason = "it was shortened by another program";
+    reason = shortenedText(file_.size(), std::ssize(*content));
     return false;
   }
+  const std::string others = linesOfOthers(*content);
   std::stable_sort(rows_.begin(), rows_.end(), [](const Place& a, const Place& b) { return a.number < b.number; });
   std::vector<RowChecksum> checksums = checksumsOfRows();
   std::string sorted;
@@ -137,6 +151,7 @@ bool ResultFile::rewriteInOrder(std::string_view closing, std::string& reason) {
     // Until the rows are replaced those of before are there.
     if (place.checksum != before) checksums.push_back({place.number, place.checksum});
   }
+  sorted += others;
   sorted += closing;
   return checksums_.replace(checksums, reason) && replaceFile(path(), sorted, reason);
 }

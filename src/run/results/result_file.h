@@ -55,6 +55,7 @@ class ResultFile final {
   bool isInOrder() const;
   std::string settleLine(std::string_view content, Place& place) const;
   std::vector<RowChecksum> checksumsOfRows() const;
+  std::string linesOfOthers(std::string_view content) const;
   bool rewriteInOrder(std::string_view closing, std::string& reason);
 
   RecordFile file_;

@@ -80,9 +80,8 @@ void SimulatedValuesFile::add(std::span<const double> parameterValues, const Eva
     bytes.append(reinterpret_cast<const char*>(values->data()), values->size() * sizeof(double));
   }
   appendBytes(bytes, checksumWithRow(bytes, parameterValues, result.measureValues));
-  const std::int64_t offset = file_.size();
   file_.append(bytes);
-  noteOffset(result.number, offset);
+  noteOffset(result.number, file_.size() - std::ssize(bytes));
 }
 
 /// Replaces a file of an earlier version, whose checksums do not depend on the rows.

@@ -79,18 +79,32 @@ void logValues(RunLog& log, std::string_view heading, std::span<const std::strin
   }
 }
 
+/// Where the only feasible steps of some parameters are those that leave them as they are.
+void warnOfHeldParameters(const TaskContext& context, const SearchSummary& summary) {
+  if (summary.heldParameters.empty()) return;
+  std::string names;
+  for (const std::size_t j : summary.heldParameters) {
+    names += fmt::format("{}{}", names.empty() ? "" : ", ", context.space.names[j]);
+  }
+  context.log.warning(fmt::format(
+      "Constraints or equations have kept parameters at one value or close to it, as every larger change of them was "
+      "replaced: {}. A parameter that must equal an expression of others is one with Parameter_Type = 2",
+      names));
+}
+
 /// Where most of a search is one set again and again: constraints with two equal sides, or bounds that they meet.
 /// A population of equal points proposes nothing else, so that only those of its sample count.
-void warnOfNoWidth(const TaskContext& context, const SearchSummary& summary, std::int64_t populationSize) {
+bool warnOfNoWidth(const TaskContext& context, const SearchSummary& summary, std::int64_t populationSize) {
   const std::int64_t returned = 2 * std::int64_t{summary.returnedCount};
   const std::int64_t proposed =
       populationSize > 0 ? std::min<std::int64_t>(populationSize, summary.evaluationCount) : summary.evaluationCount;
-  if (returned == 0 || returned < proposed || returned < summary.replacedCount) return;
+  if (returned == 0 || returned < proposed || returned < summary.replacedCount) return false;
   context.log.warning(fmt::format(
       "{} of {} points that cannot be run could only be replaced by a set already evaluated: do "
       "constraints and equations leave any width? A parameter that must equal an expression of others is one with "
       "Parameter_Type = 2",
       summary.returnedCount, summary.replacedCount));
+  return true;
 }
 
 void logBestSet(const TaskContext& context, const ParameterSet& best, const EvaluationResult& result) {
@@ -357,7 +371,7 @@ TaskOutcome OptimisationTask::run(const TaskContext& context) {
         "replaced before their evaluation: {}",
         summary.replacedCount));
   }
-  warnOfNoWidth(context, summary, method->populationSize());
+  if (!warnOfNoWidth(context, summary, method->populationSize())) warnOfHeldParameters(context, summary);
   const std::vector<ParameterSet> best{summary.best};
   if (best.front().empty()) return {summary.terminationMessage};
   if (context.searchEnded) context.searchEnded(summary);

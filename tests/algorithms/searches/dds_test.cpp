@@ -144,6 +144,28 @@ TEST(Dds, StaysInsideTheBoundsAndOnAFixedParameter) {
   EXPECT_EQ(dds.summary().best[0], 2.0);  // reached by a point that was reflected past the other bound
 }
 
+TEST(Dds, NamesParametersThatConstraintsHold) {
+  using Set = std::span<const double>;
+  const std::tuple<bool (*)(Set), std::vector<std::size_t>> cases[] = {
+      {[](Set x) { return x[0] <= x[1] && x[0] >= x[1]; }, {0, 1}},
+      {[](Set x) { return std::abs(x[0] - x[2]) <= 1e-4; }, {0, 2}},
+      {[](Set x) { return std::abs(x[0] - x[2]) <= 0.1; }, {}},
+      {[](Set x) { return x[0] + x[1] + x[2] >= 3.0; }, {}},  // the optimum is on it
+      {[](Set) { return true; }, {}},
+  };
+  for (const auto& [holds, held] : cases) {
+    FunctionEvaluator evaluator(
+        [](const ParameterSet& x) { return resultOf(x[0] * x[0] + x[1] * x[1] + x[2] * x[2]); });
+    UniformGenerator random(1);
+    SearchBounds bounds = box(3, -5.0, 5.0);
+    bounds.initial.assign(3, 2.0);
+    Dds dds({}, 150, true, bounds, evaluator, random,
+            feasibleWhere([&holds](const auto& set) { return holds(set); }, "held"));
+    run(dds);
+    EXPECT_EQ(dds.summary().heldParameters, held) << &holds - &std::get<0>(cases[0]);
+  }
+}
+
 TEST(Dds, RefusesImpossibleInputWithAStatus) {
   FunctionEvaluator evaluator([](const ParameterSet&) { return resultOf(0.0); });
   UniformGenerator random(1);

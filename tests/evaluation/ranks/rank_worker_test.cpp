@@ -92,8 +92,9 @@ TEST_F(RankWorkerTest, AWarningIsToldOnceWithTheNextResultThere) {
   keepAt_ = 2;
   runWorkerLoop(job_, *runner_, watch_);
   ASSERT_EQ(job_.sent.size(), 5U);
-  EXPECT_THAT(warningsOf(1), ElementsAre(HasSubstr("often.txt was not kept: the model run did not write it")));
-  EXPECT_THAT(warningsOf(2), IsEmpty());
+  const auto absent = [this](std::size_t set) { return decodeResult(job_.sent.at(set).content).result.absentFiles; };
+  EXPECT_THAT(absent(1).at(0).reason, HasSubstr("often.txt was not kept: the model run did not write it"));
+  EXPECT_THAT(absent(2), IsEmpty());
   EXPECT_THAT(workerWarningsOf(3),
               ElementsAre(HasSubstr("Evaluation of parameter set No. 17: The folder of this run was not kept as")));
   EXPECT_THAT(warningsOf(3), IsEmpty());

@@ -130,6 +130,28 @@ TEST_F(ResultFileTest, RowsStayWhereTheyAreWhenTheyCannotBePutInOrder) {
   EXPECT_TRUE(folder_.read("r.dat").ends_with("2\tOK\t2\t2\t2\t2\n1\tOK\t1\t1\t1\t1\n# done\n"));
 }
 
+TEST_F(ResultFileTest, OneThatAnotherProgramHasShortenedTakesNoMoreRows) {
+  for (const bool isAtEnd : {false, true}) {
+    open();
+    for (const int number : {2, 1}) add(success(number, 1, 1), 1);
+    folder_.write("r.dat", folder_.read("r.dat").substr(0, 60));
+    if (!isAtEnd) reason_ = refusalOf([this] { add(success(3, 1, 1), 1); });
+    EXPECT_FALSE(isAtEnd && results_.finish({}, reason_));
+    EXPECT_THAT(reason_, testing::HasSubstr("another program has shortened it, from "));
+    EXPECT_EQ(folder_.read("r.dat").size(), 60U);
+  }
+}
+
+TEST_F(ResultFileTest, WhatAnotherProgramAppendsStays) {
+  open();
+  add(success(2, 1, 1), 1);
+  folder_.write("r.dat", folder_.read("r.dat") + "# a note");
+  add(success(1, 1, 1), 1);
+  EXPECT_THAT(folder_.read("r.dat"), testing::EndsWith("# a note\n1\tOK\t1\t1\t1\t1\n"));
+  ASSERT_TRUE(results_.finish({}, reason_)) << reason_;
+  EXPECT_THAT(folder_.read("r.dat"), testing::EndsWith("1\tOK\t1\t1\t1\t1\n2\tOK\t1\t1\t1\t1\n# a note\n"));
+}
+
 TEST_F(ResultFileTest, ARowWithoutRoomForItsChecksumIsNotWritten) {
   open();
   ::signal(SIGXFSZ, SIG_IGN);
