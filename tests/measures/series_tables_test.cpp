@@ -46,6 +46,15 @@ TEST_F(SeriesTablesTest, MeasuresShareTheFilesTheyNameAlike) {
   EXPECT_EQ(tables.simulation(2).itemCount(), 2);
 }
 
+TEST_F(SeriesTablesTest, ObservationsThatMayBeMarkersOfMissingOnesAreWarnedOf) {
+  folder_.write("marked.csv", "time,Q\n2001-01-01,-99.99\n2001-01-02,3\n2001-01-03,-99.99\n");
+  folder_.write("cold.csv", "time,T\n2001-01-01,-99\n2001-01-02,-120\n");
+  const std::vector<OutputMeasure> measures{measure("sim.csv", "marked.csv"), measure("sim.csv", "marked.csv"),
+                                            measure("sim.csv", "cold.csv")};
+  EXPECT_THAT(SeriesTables::MirevoTSobjectInit(measures, kPeriod).warnings(),
+              ElementsAre(HasSubstr("marked.csv: item No. 1 (Q) is -99.99 at 2 of 3 times in the evaluation period")));
+}
+
 TEST_F(SeriesTablesTest, SetupFailuresEndTheRun) {
   folder_.write("bad.csv", "time,Q\n2001-01-01,1,2\n");
   folder_.write("text.csv", "time,Q\n2001-01-01,bad\n");
