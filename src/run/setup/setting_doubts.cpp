@@ -92,6 +92,11 @@ void warnOfMeasures(const RunConfig& config, const SectionsRead& sections) {
   }
 }
 
+void warnOfMeasureFile(const RunConfig& config, const SectionsRead& sections) {
+  if (trim(config.measureFile).empty() || config.readsMeasureFile()) return;
+  sections.measureFile->warn("File_Name", "has no effect, as no output measure has Interface_Type = 1");
+}
+
 /// Whether the value of an objective function becomes ever better the further a measure is below 0.
 bool rewardsTooLittle(const RunConfig& config, const ObjectiveFunction& objective, const OutputMeasure& measure) {
   if (config.aggregationMethod == AggregationMethod::zero || objective.functionType != FunctionType::sum ||
@@ -165,6 +170,7 @@ void warnOfDoubtfulSettings(const RunConfig& config, const SectionsRead& section
   warnOfIdValues(config, sections);
   warnOfParameters(config, sections);
   warnOfMeasures(config, sections);
+  warnOfMeasureFile(config, sections);
   warnOfObjectives(config, sections);
   warnOfCoverage(config, sections);
   if (config.task && config.task->hasFinalRun()) warnOfSearch(config, sections);

@@ -262,6 +262,8 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatAreSeldomMeant)
       {"Interface_Type = 0 => 1 & Aggregation_Method = 0 => Aggregation_Method = 0\nMinimum_Coverage = 0.5",
        "setup.kdx:61:20: Minimum_Coverage: has no effect, as no output measure compares series"},
       {"Aggregation_Method = 0 => Aggregation_Method = 0\nMinimum_Coverage = 0.5", ""},
+      {"TqSEKdxListItemCount = 2 => 1",
+       "setup.kdx:85:21: File_Name: has no effect, as no output measure has Interface_Type = 1"},
       {"Aggregation_Method = 0 => 3 & Option = 2 => 0 & NoSimultaneousSim = 4 => 1", ""},
       {"Statistic_Type = 1 => 0 & Function_Type = 2 => 0",
        "setup.kdx:92:25: Function_Type: a sum with a difference that may be negative (\"Flow error\") is the smaller "
