@@ -10,6 +10,7 @@
 
 #include <fmt/core.h>
 
+#include "common/calendar.h"
 #include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/text.h"
@@ -147,15 +148,33 @@ void SeriesTables::checkItems(std::span<const OutputMeasure> measures, const Eva
     if (observationIndex_[i] == kNoSeries) continue;
     requireItem(observation(i), measures[i].observation);
     const ObservedSeries observed = readObservedSeries(i, measures[i], period, SeriesPrecision::single, observation(i));
+    requireObservations(observed, measures[i], period);
     warnOfMarkers(observed, measures[i]);
     // Files in the base folder that have no time steps yet tell nothing about their columns.
     if (simulation(i).timeStepCount() < 1) {
-      needsPairs_[i] = !observed.values.empty();
+      needsPairs_[i] = true;
       continue;
     }
     requireItem(simulation(i), measures[i].simulation);
-    needsPairs_[i] = observation(i).timeStepCount() > 0 && hasPairs(measures[i], period, simulation(i), observation(i));
+    needsPairs_[i] = hasPairs(measures[i], period, simulation(i), observation(i));
   }
+}
+
+void SeriesTables::requireObservations(const ObservedSeries& observed, const OutputMeasure& measure,
+                                       const EvaluationPeriod& period) {
+  if (!observed.values.empty()) return;
+  TimeSeriesObject& series = observation(observed.measure);
+  const std::string& name = observationNames_[observationIndex_[observed.measure]];
+  const std::string& location = measure.observation.fileLocation;
+  if (series.timeStepCount() < 1) {
+    fatalError("Error getting time properties of TS object of file " + name, location + "the file has no time step");
+  }
+  fatalError(
+      withNumber("Error: No simulated data found at observation times for item No. % in ", measure.simulation.itemNo) +
+          simulationNames_[simulationIndex_[observed.measure]],
+      fmt::format("{}{}\nthe evaluation period is {} to {}\n{}", location,
+                  describeLackOfObservations(series, measure.observation.itemNo, name), formatDate(period.start),
+                  formatDate(period.end), describeSpan(series, name)));
 }
 
 void SeriesTables::warnOfMarkers(const ObservedSeries& observed, const OutputMeasure& measure) {
