@@ -7,7 +7,9 @@
 #include "common/encoding.h"
 #include "common/files.h"
 #include "common/reading_watch.h"
+#include "common/take_text.h"
 #include "common/text.h"
+#include "common/utf8.h"
 
 namespace mirevo {
 namespace {
@@ -86,6 +88,7 @@ std::optional<MeasureFile> parseMeasureFile(const std::string& sourceName, std::
                                             std::size_t neededCount, std::string& reason, ReadingWatch* watch) {
   MeasureFile file;
   file.endsLine = endsLine(content);
+  takeText(content, kByteOrderMark);
   Words words(content, " \t,;\r", watch);
   for (std::string_view word = words.next(); !word.empty(); word = words.next()) {
     const std::optional<double> number = parseReal(word);

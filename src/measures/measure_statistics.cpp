@@ -14,6 +14,19 @@
 #include "measures/statistics.h"
 
 namespace mirevo {
+
+std::string describeSpan(const TimeSeriesObject& series, const std::string& fileName) {
+  const std::span<const double> times = series.times();
+  return fmt::format("{} begins {} and has {} time steps over {} days", fileName,
+                     formatDate(series.startTime().value()), times.size(), formatReal(times.back() - times.front()));
+}
+
+std::string describeLackOfObservations(const TimeSeriesObject& series, int item, const std::string& fileName) {
+  return fmt::format(
+      "there is nothing to compare with: item No. {} ({}) of the observed {} has no value in the evaluation period",
+      item, series.itemName(item), fileName);
+}
+
 namespace {
 
 /// An item of an opened file, with its time axis.
@@ -70,18 +83,13 @@ struct Weights {
 };
 
 std::string describeSpan(const SeriesItem& item) {
-  const std::span<const double> times = item.series.times();
-  return fmt::format("{} begins {} and has {} time steps over {} days", item.fileName, formatDate(item.start),
-                     times.size(), formatReal(times.back() - times.front()));
+  return describeSpan(item.series, item.fileName);
 }
 
 /// If there are no observations in the period: that this, and not the simulated file, is at fault.
 std::string describeLackOf(const MeasureStatistics& statistics, const SeriesItem& observation) {
   if (statistics.observationCount > 0) return {};
-  return fmt::format(
-      "there is nothing to compare with: item No. {} ({}) of the observed {} has no value in the "
-      "evaluation period\n",
-      observation.item, observation.series.itemName(observation.item), observation.fileName);
+  return describeLackOfObservations(observation.series, observation.item, observation.fileName) + "\n";
 }
 
 /// Calls `use(time, observed, simulated)` for every observation in the period that is not missing, in order, with

@@ -2,6 +2,7 @@
 
 #include <cstddef>
 #include <optional>
+#include <string>
 #include <vector>
 
 #include "measures/measure_file.h"
@@ -48,6 +49,11 @@ MeasureStatistics computeMeasureStatistics(const OutputMeasure& measure, const E
 /// FatalError if the series cannot be read.
 bool hasPairs(const OutputMeasure& measure, const EvaluationPeriod& period, TimeSeriesObject& simulation,
               TimeSeriesObject& observation);
+
+/// For people: the time span of a series that has steps, and that an item of an observed one has no value in the
+/// period.
+std::string describeSpan(const TimeSeriesObject& series, const std::string& fileName);
+std::string describeLackOfObservations(const TimeSeriesObject& series, int item, const std::string& fileName);
 
 /// The contribution to an objective function of the statistic that `Statistic_Type` selects.
 double selectStatistic(const MeasureStatistics& statistics, StatisticType type);

@@ -1,5 +1,7 @@
 #include "measures/observed_series.h"
 
+#include <algorithm>
+#include <array>
 #include <limits>
 #include <optional>
 #include <span>
@@ -29,6 +31,24 @@ ObservedSeries readObservedSeries(std::size_t index, const OutputMeasure& measur
     observed.values.push_back(precision == SeriesPrecision::exact ? exact[k] : values[k]);
   }
   return observed;
+}
+
+double usualMarkerAmong(std::span<const double> values) {
+  constexpr std::array<float, 11> kMarkers = {-99.0F,  -999.0F, -9999.0F, -99999.0F, -999999.0F, -99.9F,
+                                              -99.99F, -999.9F, -999.99F, -9999.9F,  -9999.99F};
+  std::array<std::size_t, kMarkers.size()> counts{};
+  double least = std::numeric_limits<double>::infinity();  // of the other values
+  for (const double value : values) {
+    const auto* const found = std::find(kMarkers.begin(), kMarkers.end(), static_cast<float>(value));
+    if (found == kMarkers.end()) {
+      least = std::min(least, value);
+    } else {
+      ++counts[static_cast<std::size_t>(found - kMarkers.begin())];
+    }
+  }
+  const auto most = static_cast<std::size_t>(std::max_element(counts.begin(), counts.end()) - counts.begin());
+  if (counts[most] == 0 || !(kMarkers[most] < least)) return std::numeric_limits<double>::quiet_NaN();
+  return kMarkers[most];
 }
 
 std::size_t simulatedValueCount(std::span<const ObservedSeries> observed, SeriesPrecision precision) {

@@ -23,6 +23,10 @@ struct ObservedSeries {
 ObservedSeries readObservedSeries(std::size_t index, const OutputMeasure& measure, const EvaluationPeriod& period,
                                   SeriesPrecision precision, TimeSeriesObject& observation);
 
+/// Which of the values is often used to mark missing ones (-99, -999.9, ...) and is smaller than all that are not, so
+/// that it is hardly one of them; NaN if there is none. With several the most frequent one.
+double usualMarkerAmong(std::span<const double> values);
+
 /// How many numbers appendSimulatedValues() appends for these series.
 std::size_t simulatedValueCount(std::span<const ObservedSeries> observed, SeriesPrecision precision);
 

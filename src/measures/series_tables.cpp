@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cassert>
+#include <cmath>
 #include <filesystem>
 #include <new>
 #include <system_error>
@@ -9,6 +10,7 @@
 
 #include <fmt/core.h>
 
+#include "common/calendar.h"
 #include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/text.h"
@@ -125,7 +127,7 @@ SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> mea
   }
   const auto open = [&tables](const std::string& name, const std::string& location, std::span<const int> items) {
     auto series = openTimeSeries(name, location, tables.reading_, items);
-    if (const std::string doubt = series->doubt(); !doubt.empty()) tables.warnings_.push_back(location + doubt);
+    for (const std::string& doubt : series->doubts()) tables.warnings_.push_back(location + doubt);
     return series;
   };
   for (std::size_t i = 0; i < observationLocations.size(); ++i) {
@@ -145,16 +147,54 @@ void SeriesTables::checkItems(std::span<const OutputMeasure> measures, const Eva
   for (std::size_t i = 0; i < measures.size(); ++i) {
     if (observationIndex_[i] == kNoSeries) continue;
     requireItem(observation(i), measures[i].observation);
+    const ObservedSeries observed = readObservedSeries(i, measures[i], period, SeriesPrecision::single, observation(i));
+    requireObservations(observed, measures[i], period);
+    warnOfMarkers(observed, measures[i]);
     // Files in the base folder that have no time steps yet tell nothing about their columns.
     if (simulation(i).timeStepCount() < 1) {
-      const ObservedSeries observed =
-          readObservedSeries(i, measures[i], period, SeriesPrecision::single, observation(i));
-      needsPairs_[i] = !observed.values.empty();
+      needsPairs_[i] = true;
       continue;
     }
     requireItem(simulation(i), measures[i].simulation);
-    needsPairs_[i] = observation(i).timeStepCount() > 0 && hasPairs(measures[i], period, simulation(i), observation(i));
+    needsPairs_[i] = hasPairs(measures[i], period, simulation(i), observation(i));
   }
+}
+
+void SeriesTables::requireObservations(const ObservedSeries& observed, const OutputMeasure& measure,
+                                       const EvaluationPeriod& period) {
+  if (!observed.values.empty()) return;
+  TimeSeriesObject& series = observation(observed.measure);
+  const std::string& name = observationNames_[observationIndex_[observed.measure]];
+  const std::string& location = measure.observation.fileLocation;
+  if (series.timeStepCount() < 1) {
+    fatalError("Error getting time properties of TS object of file " + name, location + "the file has no time step");
+  }
+  fatalError(
+      withNumber("Error: No simulated data found at observation times for item No. % in ", measure.simulation.itemNo) +
+          simulationNames_[simulationIndex_[observed.measure]],
+      fmt::format("{}{}\nthe evaluation period is {} to {}\n{}", location,
+                  describeLackOfObservations(series, measure.observation.itemNo, name), formatDate(period.start),
+                  formatDate(period.end), describeSpan(series, name)));
+}
+
+void SeriesTables::warnOfMarkers(const ObservedSeries& observed, const OutputMeasure& measure) {
+  const double marker = usualMarkerAmong(observed.values);
+  if (std::isnan(marker)) return;
+  const std::string& name = observationNames_[observationIndex_[observed.measure]];
+  const int item = measure.observation.itemNo;
+  const auto count = std::count(observed.values.begin(), observed.values.end(), marker);
+  std::string warning = fmt::format(
+      "{}{}: item No. {} ({}) is {} at {} of {} times in the evaluation period, and is compared there; if that marks "
+      "missing values, {}",
+      measure.observation.fileLocation, name, item, observation(observed.measure).itemName(item),
+      static_cast<float>(marker), count, observed.values.size(),
+      isTextSeries(name) ? fmt::format("write \"# missing = {}\" above the header row", static_cast<float>(marker))
+                         : "make it the attribute missing_value of the variable");
+  // Measures that compare the same item differ in the location at most.
+  const std::string_view text = std::string_view(warning).substr(measure.observation.fileLocation.size());
+  const bool isKnown = std::any_of(warnings_.begin(), warnings_.end(),
+                                   [text](const std::string& other) { return other.ends_with(text); });
+  if (!isKnown) warnings_.push_back(std::move(warning));
 }
 
 void SeriesTables::openSimulationFiles(std::span<const std::string> paths) {

@@ -13,6 +13,7 @@
 namespace mirevo {
 
 class ReadingWatch;
+struct ObservedSeries;
 
 /// The opened time-series files of the run: every distinct observation file, open for the whole run, and every distinct
 /// simulation file, open only while the measures of one evaluation are computed.
@@ -56,6 +57,11 @@ class SeriesTables final {
  private:
   static constexpr std::size_t kNoSeries = static_cast<std::size_t>(-1);  ///< index of a measure of interface type 1
 
+  /// Throws FatalError, as the first model run would, if there are none.
+  void requireObservations(const ObservedSeries& observed, const OutputMeasure& measure,
+                           const EvaluationPeriod& period);
+  /// If observations are a usual marker of missing values that is not marked as one.
+  void warnOfMarkers(const ObservedSeries& observed, const OutputMeasure& measure);
   void checkItems(std::span<const OutputMeasure> measures, const EvaluationPeriod& period);
 
   std::vector<std::string> observationNames_;

@@ -109,6 +109,12 @@ std::optional<RunSources> readRunSources(const RunConfig& config, const SearchSp
     return std::nullopt;
   }
   const bool isGoingOn = FileLock::isHeld(runFilePath(filePrefix, run_files::kRunLock));
+  // Runs that keep checksums have an account, too.
+  std::error_code ignored;
+  if (!record && !isGoingOn && sources.recordFault.empty() &&
+      std::filesystem::exists(runFilePath(filePrefix, names->checksums), ignored)) {
+    sources.recordFault = fileNameOf(runFilePath(filePrefix, names->record)) + ": it is not there";
+  }
   if (record && !record->stage && !isGoingOn && !sources.results.closingLines.empty()) {
     sources.recordFault = fileNameOf(runFilePath(filePrefix, names->record)) + ": it lacks its end";
     record.reset();

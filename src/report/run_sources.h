@@ -22,7 +22,7 @@ struct RunSources {
   bool isOfOtherSetup = false;  ///< that is another one than the setup of the report, by its name
   ResultTable results;          ///< rows in the order of their numbers, each number once
   RunRecord record;
-  std::string recordFault;  ///< why the record cannot be read; empty if it can, or if none was written
+  std::string recordFault;  ///< why the record cannot be read; empty if it can, or if an earlier version wrote none
   RunStage stage = RunStage::running;
   std::string ended;                ///< empty while the run goes on
   std::vector<RowFault> rowFaults;  ///< of rows that are damaged or were changed; none while the run goes on

@@ -18,7 +18,7 @@ ModelDescription describeModel(const RunConfig& config) {
   model.fileTag = config.setupName;
   model.parameterFiles = config.parameterFiles;
   model.measures = config.measures;
-  model.measureFile = config.measureFile;
+  if (config.readsMeasureFile()) model.measureFile = config.measureFile;
   model.period = config.period;
   model.minimumCoverage = config.minimumCoverage;
   model.objectives = config.objectives;

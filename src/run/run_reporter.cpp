@@ -111,6 +111,7 @@ void RunReporter::evaluationFinished(std::span<const double> set, const Evaluati
   if (!result.ok()) state_.log.line("   " + result.failure->reason);  // follows the message that it failed
   const std::vector<double> values = ToModelScale(space_, set);
   count(values, result, dateAndTimeWithZone());
+  lastWithPairs_ = {result.number, values};
   recordSeries(values, result);
   state_.progress.progressStep();
   if (const std::string problem = state_.progress.takeProblem(); !problem.empty()) state_.log.warning(problem);
@@ -126,6 +127,11 @@ void RunReporter::evaluationReplayed(std::span<const double> set, const Evaluati
   const bool lacksPairs = pairs_ != nullptr && !result.pairs.empty() && !pairs_->has(result.number);
   if (lacksPairs) pairs_->add(result.number, result.pairs);
   const std::vector<double> values = ToModelScale(space_, set);
+  if (result.pairs.empty()) {
+    replayedWithoutPairs_.insert(result.number);
+  } else {
+    lastWithPairs_ = {result.number, values};
+  }
   count(values, result, {});
   if (!result.shownSeries.empty()) {
     recordSeries(values, result);
@@ -206,12 +212,21 @@ std::string RunReporter::unkeptWarning() const {
 
 std::vector<std::string> RunReporter::differencesOfBest() const {
   if (!best()) return {};
+  const int number = best()->number;
+  // The rows of its pairs may have been lost, so that those of the final model run, of the same set, tell.
+  const bool isKnownOfFinalRun = replayedWithoutPairs_.contains(number) && lastWithPairs_.number != number &&
+                                 lastWithPairs_.parameterValues == best()->parameterValues;
+  const int judged = isKnownOfFinalRun ? lastWithPairs_.number : number;
   std::vector<RunDifference> ofBest;
-  if (pairs_ != nullptr) ofBest = findLackOfBest(best()->number, pairs_->pairs(), sources_);
+  if (pairs_ != nullptr) ofBest = findLackOfBest(judged, pairs_->pairs(), sources_);
   for (const auto& [key, difference] : differences_) {
-    if (difference.number == best()->number) ofBest.push_back(difference);
+    if (difference.number == judged) ofBest.push_back(difference);
   }
-  return sentencesOnBest(best()->number, ofBest);
+  for (RunDifference& difference : ofBest) {
+    if (isKnownOfFinalRun) difference.text += fmt::format(" (found in evaluation No. {}, of the same set)", judged);
+    difference.number = number;
+  }
+  return sentencesOnBest(number, ofBest);
 }
 
 std::set<int> RunReporter::numbersWithPairs() const {

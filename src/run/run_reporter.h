@@ -119,6 +119,12 @@ class RunReporter final : public EvaluationObserver {
   int firstSuccess_ = 0;  ///< with which others are compared
   /// By kind, evaluation and measure.
   std::map<std::tuple<RunDifference::Kind, int, std::size_t>, RunDifference> differences_;
+  std::set<int> replayedWithoutPairs_;  ///< as many as the first successful run, or lost ones
+  /// The last evaluation of which it is known whether it differs.
+  struct {
+    int number = 0;
+    std::vector<double> parameterValues;  ///< model scale
+  } lastWithPairs_;
   std::set<int> others_;                 ///< evaluations without such a difference, with pairs of other observations
   std::size_t differencesWarnedOf_ = 0;  ///< one by one
   int runsWithProcessesLeft_ = 0;

@@ -341,6 +341,9 @@ TEST(LocalSensitivity, ItsWarningsAreCountedAndPassedOnLikeAllOthers) {
   EXPECT_EQ(occurrences(folder.read("basin._spi_"), "\nMESSAGWarning: "), warnings);
   EXPECT_EQ(occurrences(folder.read("basin_Sensitivity_Run.dat"), "\nwarning\t"), warnings);
   EXPECT_THAT(run.error, HasSubstr(fmt::format("{} warning", warnings)));
+  folder.editSetup("Weight = 1.0\n        Weight_Above = 1.0", "Weight = 0.0\n        Weight_Above = 0.0");
+  ASSERT_EQ(runProgram({setup}).exitCode, 0);
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("\nWarning: No covariance matrix: 0 observations count, as the "));
 }
 
 TEST(Uncertainty, SummaryAndBandAreThoseOfTheSample) {

@@ -214,7 +214,8 @@ TEST(MeasureStatistics, ATextColumnIsRefusedWithItsPlace) {
 
 TEST(MeasureFile, FreeFormat) {
   std::string reason;
-  const auto file = parseMeasureFile("m.txt", "# measures\r\n1.5, -2 ;\t3D2\r\n\n.25# the last\n,,7", 1, reason);
+  const auto file =
+      parseMeasureFile("m.txt", "\xEF\xBB\xBF# measures\r\n1.5, -2 ;\t3D2\r\n\n.25# the last\n,,7", 1, reason);
   ASSERT_TRUE(file.has_value()) << reason;
   EXPECT_THAT(file->numbers, ElementsAre(1.5, -2.0, 300.0, 0.25, 7.0));
   EXPECT_THAT(parseMeasureFile("m.txt", "", 1, reason).value().numbers, IsEmpty());

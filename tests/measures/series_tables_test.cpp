@@ -46,9 +46,20 @@ TEST_F(SeriesTablesTest, MeasuresShareTheFilesTheyNameAlike) {
   EXPECT_EQ(tables.simulation(2).itemCount(), 2);
 }
 
+TEST_F(SeriesTablesTest, ObservationsThatMayBeMarkersOfMissingOnesAreWarnedOf) {
+  folder_.write("marked.csv", "time,Q\n2001-01-01,-99.99\n2001-01-02,3\n2001-01-03,-99.99\n");
+  folder_.write("cold.csv", "time,T\n2001-01-01,-99\n2001-01-02,-120\n");
+  const std::vector<OutputMeasure> measures{measure("sim.csv", "marked.csv"), measure("sim.csv", "marked.csv"),
+                                            measure("sim.csv", "cold.csv")};
+  EXPECT_THAT(SeriesTables::MirevoTSobjectInit(measures, kPeriod).warnings(),
+              ElementsAre(HasSubstr("marked.csv: item No. 1 (Q) is -99.99 at 2 of 3 times in the evaluation period")));
+}
+
 TEST_F(SeriesTablesTest, SetupFailuresEndTheRun) {
   folder_.write("bad.csv", "time,Q\n2001-01-01,1,2\n");
   folder_.write("text.csv", "time,Q\n2001-01-01,bad\n");
+  folder_.write("none.csv", "time,Q\n");
+  folder_.write("empty.csv", "time,Q\n2000-12-31,4\n2001-01-01,\n");
   OutputMeasure located = measure("sim.csv", "gone.csv");
   located.observation.fileLocation = "s.kdx:7:9: File_Name: ";
   OutputMeasure withItem = measure("sim.csv", "obs.csv", 3);
@@ -64,6 +75,11 @@ TEST_F(SeriesTablesTest, SetupFailuresEndTheRun) {
        "the file has 2 items\n1: Q\n2: H"},
       {located, "Error opening TS object for file: " + folder_ / "gone.csv",
        "\ns.kdx:7:9: File_Name: " + folder_ / "gone.csv" + ": No such file"},
+      {measure("sim.csv", "none.csv"), "Error getting time properties of TS object of file " + folder_ / "none.csv",
+       "the file has no time step"},
+      {measure("sim.csv", "empty.csv"),
+       "Error: No simulated data found at observation times for item No. 1 in " + folder_ / "sim.csv",
+       "nothing to compare with: item No. 1 (Q) of the observed " + folder_ / "empty.csv" + " has no value in the"},
       {measure("sim.csv", "text.csv"), "Error getting data of TS item in " + folder_ / "text.csv", "text.csv:2:12:"},
   };
   for (const auto& [measure, message, detail] : cases) {

@@ -62,7 +62,7 @@ TEST(ReportedCovariance, IsThatOfTheAnalysisToTheLastBit) {
   const auto reported = reportedCovariance(folder / "basin", fault);
   ASSERT_TRUE(reported.has_value());
   EXPECT_THAT(reported->names, ElementsAre(space.names[0], space.names[2]));
-  EXPECT_THAT(reported->leftOut, ElementsAre(ReportedLeftOut{space.names[1], "no simulated value depends on it"}));
+  EXPECT_THAT(reported->leftOut, ElementsAre(ReportedLeftOut{space.names[1], covariance.leftOut[0].reason}));
   EXPECT_EQ(reported->correlation, covariance.correlation);
   const std::vector<ParameterLimits> limits = parameterLimits(covariance, space, space.initial);
   EXPECT_THAT(reported->estimate, ElementsAre(1.0 / 3.0, std::exp(-1.0)));

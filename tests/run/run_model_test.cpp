@@ -17,5 +17,14 @@ TEST(RunModel, SetupsOfOneNameDoNotMeetInASharedProcessFolder) {
   EXPECT_NE(launcherSettings(config, 4).processFolderPrefix, first);
 }
 
+TEST(RunModel, AnOutputMeasureFileThatNoMeasureReadsIsNotTheModels) {
+  RunConfig config;
+  config.measureFile = "/a/measures.txt";
+  config.measures.resize(1);
+  EXPECT_EQ(describeModel(config).measureFile, "");
+  config.measures[0].interfaceType = InterfaceType::measureFile;
+  EXPECT_EQ(describeModel(config).measureFile, config.measureFile);
+}
+
 }  // namespace
 }  // namespace mirevo

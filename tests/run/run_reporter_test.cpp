@@ -101,6 +101,24 @@ TEST_F(RunReporterTest, AggregatesUnknownOnArrivalAreFilledInWhenTheTransformati
   }
 }
 
+TEST_F(RunReporterTest, TheFinalRunTellsThePairsOfTheBestThatWereLost) {
+  const auto haveFewerPairs = [this](int number) {
+    reporter_.runCompared({.differences = {{number, 0, RunDifference::Kind::fewerPairs, "2 of 48", false}}});
+  };
+  const double best = 1.0;
+  reporter_.evaluationReplayed(std::span(&best, 1), {.number = 1, .objectiveValues = {3.0}, .aggregate = 3.0});
+  finish(2, 9.0, 2.0);
+  haveFewerPairs(2);
+  EXPECT_THAT(reporter_.differencesOfBest(), testing::IsEmpty()) << "of another set";
+  // Of an earlier run, too, but made again.
+  reporter_.evaluationReplayed(std::span(&best, 1),
+                               {.number = 3, .objectiveValues = {3.0}, .aggregate = 3.0, .pairs = {MeasurePairs{}}});
+  haveFewerPairs(3);
+  EXPECT_THAT(reporter_.differencesOfBest(),
+              testing::ElementsAre("The best evaluation, No. 1, is judged by fewer observations than the first "
+                                   "successful run: 2 of 48 (found in evaluation No. 3, of the same set)"));
+}
+
 TEST_F(RunReporterTest, EvaluationsThatDifferFromTheFirstSuccessfulRunAreNamed) {
   const FileForm form{.endsLine = false, .stepCount = 48, .gapStart = 86400, .gapEnd = 90000};
   const MeasurePairs first{0, 48, 0, 86400, 2 * 86400, {0.1, 0.5, 1.0}, {-1.0, 1.0 / 3.0, 2.0}, form};

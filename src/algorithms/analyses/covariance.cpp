@@ -183,7 +183,9 @@ std::vector<double> invertWhatCanBe(const WeightedModel& weighted, std::span<con
     } else if (!std::isfinite(lengths[j])) {
       result.leftOut.push_back({j, "its derivatives are not known"});
     } else if (lengths[j] == 0.0) {
-      result.leftOut.push_back({j, "no simulated value depends on it"});
+      result.leftOut.push_back({j,
+                                "no simulated value changes with its step; if it has an effect, a larger step or more "
+                                "digits in the model's output show it"});
     } else if (weighted.lost[j] > kMostLost) {
       result.leftOut.push_back({j, "the effect of its step is lost in the rounding of the model's output"});
     } else {

@@ -146,6 +146,25 @@ double quotient(const ParameterDifference& difference, double below, double base
   return (std::isnan(below) ? above - base : base - below) / width;
 }
 
+/// The output measures, in 64 bits where the result has them.
+std::span<const double> measuresOf(const EvaluationResult& result) {
+  return result.exactMeasures.empty() ? result.measureValues : result.exactMeasures;
+}
+
+/// Says of each parameter whose perturbed runs have the measures of the base run.
+void noteWithoutEffect(std::span<const EvaluationResult> results, PerturbationPlan& plan) {
+  const auto isAsInBaseRun = [&](std::size_t set) {
+    return results[set].ok() && std::ranges::equal(measuresOf(results[set]), measuresOf(results.front()));
+  };
+  for (ParameterDifference& difference : plan.differences) {
+    if (!difference.problem.empty() || measuresOf(results.front()).empty()) continue;
+    if (!isAsInBaseRun(0) || !isAsInBaseRun(difference.minus) || !isAsInBaseRun(difference.plus)) continue;
+    difference.warnings.emplace_back(
+        "no output measure changes with its step: it has no effect, or one that is lost in the rounding of the model's "
+        "output, which a larger step or more digits show");
+  }
+}
+
 /// The warning of perturbed runs that fit better than the base set; empty where there is none.
 std::string betterFitText(std::span<const EvaluationResult> results) {
   constexpr double kRounding = 1.0 - 1.0e-6;  // of the values that the model writes
@@ -192,7 +211,8 @@ LocalSensitivity localSensitivity(const SensitivitySettings& settings, const Sea
   const IncomparableOutputs incomparable = incomparableMeasures(sensitivity.plan, sensitivity.results);
   sensitivity.measures =
       tabulate(sensitivity.plan, sensitivity.results, incomparable, [](const EvaluationResult& result) {
-        return result.exactMeasures.empty() ? result.measureValues : result.exactMeasures;
+        const std::span<const double> values = measuresOf(result);
+        return std::vector(values.begin(), values.end());
       });
   sensitivity.objectives = tabulate(sensitivity.plan, sensitivity.results, ofObjectives(incomparable, objectives),
                                     [&](const EvaluationResult& result) {
@@ -201,6 +221,7 @@ LocalSensitivity localSensitivity(const SensitivitySettings& settings, const Sea
                                                  : objectiveFunctionValues(objectives, result.exactMeasures);
                                     });
   noteIncomparable(incomparable, sensitivity.measures, measures, sensitivity.plan);
+  noteWithoutEffect(sensitivity.results, sensitivity.plan);
   const bool hasObjectives = !sensitivity.objectives.base.empty();
   sensitivity.ranking = ranked(hasObjectives ? sensitivity.objectives.composite : sensitivity.measures.composite);
   return sensitivity;

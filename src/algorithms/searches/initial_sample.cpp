@@ -87,12 +87,22 @@ class RowSplitter {
   char separator_ = ' ';
 };
 
+/// Without quotes around it, which some programs write around headings.
+std::string_view withoutQuotes(std::string_view name) {
+  const bool isQuoted = name.size() > 1 && name.front() == '"' && name.back() == '"';
+  return isQuoted ? name.substr(1, name.size() - 2) : name;
+}
+
 /// Entry c of the result is the index of the parameter in column c.
 std::vector<std::size_t> parametersOfColumns(const std::vector<std::string_view>& header, const std::string& place,
                                              const SearchSpace& space) {
   std::vector<std::size_t> parameters;
-  for (const std::string_view name : header) {
-    const auto found = std::find(space.names.begin(), space.names.end(), name);
+  for (std::string_view name : header) {
+    auto found = std::find(space.names.begin(), space.names.end(), name);
+    if (found == space.names.end()) {
+      name = withoutQuotes(name);
+      found = std::find(space.names.begin(), space.names.end(), name);
+    }
     if (found == space.names.end()) {
       const std::optional<std::string> near = nearestName(name, space.names);
       const std::string hint = near              ? fmt::format("; did you mean \"{}\"?", *near)

@@ -70,6 +70,52 @@ bool isHeadingOfHours(std::string_view heading) {
   return std::find(kHeadings.begin(), kHeadings.end(), toLowerAscii(letters)) != kHeadings.end();
 }
 
+constexpr std::string_view kMissing = "missing";
+
+bool isLetter(char c) {
+  return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z');
+}
+
+/// Whether the word, in lower case, announces the number that marks missing values; `before` is the word before it.
+bool namesMissing(std::string_view word, std::string_view before) {
+  constexpr std::array<std::string_view, 5> kNames = {"nodata", "novalue", "fillvalue", "missingvalue", "undef"};
+  if (std::find(kNames.begin(), kNames.end(), word) != kNames.end()) return true;
+  if ((before == "no" && (word == "data" || word == "value")) || (before == "fill" && word == "value")) return true;
+  return editDistance(word, kMissing) <= 1;
+}
+
+/// The number in a comment that seems to be meant as the marker of missing values: the last thing of its phrase, with
+/// nothing but words like "value" and signs between it and a word for missing values. Empty without one.
+std::string_view numberMeantAsMissing(std::string_view comment) {
+  constexpr std::array<std::string_view, 16> kBetween = {"value", "values", "val",    "data",  "code",    "flag",
+                                                         "mark",  "marked", "marker", "coded", "written", "is",
+                                                         "are",   "as",     "with",   "by"};
+  bool isAnnounced = false;
+  std::string before;
+  for (std::size_t i = 0; i < comment.size();) {
+    std::size_t end = i + 1;
+    if (isLetter(comment[i])) {
+      while (end < comment.size() && isLetter(comment[end])) ++end;
+      const std::string word = toLowerAscii(comment.substr(i, end - i));
+      const bool isBetween = std::find(kBetween.begin(), kBetween.end(), word) != kBetween.end();
+      isAnnounced = namesMissing(word, before) || (isAnnounced && isBetween);
+      before = word;
+    } else if (isAnnounced && std::string_view("+-.0123456789").find(comment[i]) != std::string_view::npos) {
+      while (end < comment.size() && std::string_view("+-.0123456789eE").find(comment[end]) != std::string_view::npos) {
+        ++end;
+      }
+      const std::string_view number = comment.substr(i, end - i);
+      const std::string_view rest = trim(comment.substr(end));
+      const bool endsPhrase =
+          rest.empty() || std::string_view(";,.)(]\"'#").find(rest.front()) != std::string_view::npos;
+      if (endsPhrase && parseReal(number)) return number;
+      if (number.find_first_of("0123456789") != std::string_view::npos) isAnnounced = false;
+    }
+    i = end;
+  }
+  return {};
+}
+
 }  // namespace
 
 bool CsvTimeSeries::open(const std::string& fileName) {
@@ -104,6 +150,8 @@ void CsvTimeSeries::clear() {
   content_.clear();
   lastError_.clear();
   deleteValue_ = std::numeric_limits<float>::quiet_NaN();
+  markLine_ = 0;
+  markDoubts_.clear();
   items_.clear();
   times_.clear();
   cells_.clear();
@@ -112,7 +160,7 @@ void CsvTimeSeries::clear() {
 
 bool CsvTimeSeries::readPreamble(std::size_t& position) {
   const char* const end = content_.data() + content_.size();
-  while (position < content_.size()) {
+  for (std::size_t number = 1; position < content_.size(); ++number) {
     const char* const begin = content_.data() + position;
     const char* const lineEnd = csv::endOfLine(begin, end);
     position = static_cast<std::size_t>(lineEnd - content_.data()) + (lineEnd != end ? 1 : 0);
@@ -121,24 +169,38 @@ bool CsvTimeSeries::readPreamble(std::size_t& position) {
     const std::string_view text = trim(line);
     if (text.empty()) continue;
     if (text.front() != '#') return readHeader(line);
-    if (!readMissingMark(text)) return false;
+    if (!readMissingMark(text, number)) return false;
   }
   return fail(end, "a header row (the time column's name, then one name an item)", "the end of the file");
 }
 
-bool CsvTimeSeries::readMissingMark(std::string_view line) {
+bool CsvTimeSeries::readMissingMark(std::string_view line, std::size_t number) {
   std::string_view text = trim(line.substr(1));
-  constexpr std::string_view kKeyword = "missing";
-  if (!equalIgnoringCase(text.substr(0, kKeyword.size()), kKeyword)) return true;
-  text = trim(text.substr(kKeyword.size()));
-  if (text.empty() || text.front() != '=') return true;  // a comment about missing things
+  const bool isNamed = equalIgnoringCase(text.substr(0, kMissing.size()), kMissing);
+  if (isNamed) text = trim(text.substr(kMissing.size()));
+  if (!isNamed || text.empty() || text.front() != '=') {  // a comment about other things, perhaps
+    if (const std::string_view marker = numberMeantAsMissing(line); !marker.empty()) {
+      markDoubts_.push_back(
+          {fmt::format("{}:{}: this comment marks no missing values; if {} is one, the line must be \"# missing = {}\"",
+                       sourceName_, number, marker, marker),
+           csv::parseCell(marker.data(), marker.data() + marker.size())});
+    }
+    return true;
+  }
   text = trim(text.substr(1));
   const std::optional<float> value = csv::parseCell(text.data(), text.data() + text.size());
   if (!value || text.empty()) {
     const char* const at = text.empty() ? line.data() + line.size() : text.data();
     return fail(at, "a number after \"# missing =\"", quotedForMessage(text));
   }
+  if (markLine_ != 0 && *value != deleteValue_ && !(std::isnan(*value) && std::isnan(deleteValue_))) {
+    markDoubts_.push_back(
+        {fmt::format("{}:{}: {} marks missing values, and no longer {}, as line {} says: only one value does",
+                     sourceName_, number, text, deleteValue_, markLine_),
+         std::nullopt});
+  }
   deleteValue_ = *value;
+  markLine_ = number;
   return true;
 }
 
@@ -213,15 +275,20 @@ bool CsvTimeSeries::readRow(const char* line, const char* lineEnd, csv::DateScan
   return true;
 }
 
-std::string CsvTimeSeries::doubt() const {
-  if (itemCount() < 2 || !isHeadingOfHours(itemName(1))) return {};
+std::vector<std::string> CsvTimeSeries::doubts() const {
+  std::vector<std::string> doubts;
+  for (const MarkDoubt& doubt : markDoubts_) {
+    if (doubt.marker != deleteValue_) doubts.push_back(doubt.text);
+  }
+  if (itemCount() < 2 || !isHeadingOfHours(itemName(1))) return doubts;
   constexpr std::int64_t kDaySeconds = 86400;
   const bool hasDatesOnly =
       startSecond_ % kDaySeconds == 0 &&
       std::all_of(times_.begin(), times_.end(), [](double days) { return days == std::floor(days); });
-  if (!hasDatesOnly) return {};
-  return fmt::format("{}: column 2 is called {} and is read as item No. 1, not as a part of the time; {}", sourceName_,
-                     quotedForMessage(itemName(1)), kOneColumn);
+  if (!hasDatesOnly) return doubts;
+  doubts.push_back(fmt::format("{}: column 2 is called {} and is read as item No. 1, not as a part of the time; {}",
+                               sourceName_, quotedForMessage(itemName(1)), kOneColumn));
+  return doubts;
 }
 
 bool CsvTimeSeries::isOverAt(std::size_t row) {

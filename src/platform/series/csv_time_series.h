@@ -32,10 +32,16 @@ class CsvTimeSeries final : public StoredTimeSeries {
   /// The value of the `# missing =` comment, else NaN. Empty cells, NaN and NA become NaN.
   std::optional<float> deleteValue() const override { return deleteValue_; }
   bool endsLine() const override { return mirevo::endsLine(content_); }
-  /// A time of day in a column of its own, which would be the first item.
-  std::string doubt() const override;
+  /// A time of day in a column of its own, which would be the first item; comments that seem to mark missing values in
+  /// another way, or a second time.
+  std::vector<std::string> doubts() const override;
 
  private:
+  struct MarkDoubt {
+    std::string text;
+    std::optional<float> marker;  ///< of a comment; no doubt if it is the value that marks missing ones
+  };
+
   bool readItem(std::size_t place) override;
   std::vector<double> readExactItem(std::size_t place) override;
   template <typename Value>
@@ -43,7 +49,7 @@ class CsvTimeSeries final : public StoredTimeSeries {
   const std::string& sourceName() const override { return sourceName_; }
   void clear();
   bool readPreamble(std::size_t& position);
-  bool readMissingMark(std::string_view line);
+  bool readMissingMark(std::string_view line, std::size_t number);
   bool readHeader(std::string_view line);
   bool readRows(std::size_t position);
   bool readRow(const char* line, const char* lineEnd, csv::DateScanner& dates, std::int64_t& second);
@@ -61,6 +67,8 @@ class CsvTimeSeries final : public StoredTimeSeries {
   char separator_ = ',';
   bool hasQuotes_ = false;  ///< in any row; without quotes a cell ends at the next separator
   float deleteValue_ = std::numeric_limits<float>::quiet_NaN();
+  std::size_t markLine_ = 0;  ///< of the last `# missing =`, from 1; 0: none
+  std::vector<MarkDoubt> markDoubts_;
   std::vector<std::size_t> cells_;  ///< one per row: where the cell of item cellsItem_ begins in the content
   int cellsItem_ = 1;               ///< moves with getData(), so that items read in order are found at once
 };

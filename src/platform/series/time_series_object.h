@@ -36,8 +36,8 @@ class TimeSeriesObject {
   virtual bool endsLine() const { return true; }
   virtual int itemCount() const = 0;
   virtual std::string itemName(int item) const = 0;
-  /// What in the open file seems to be meant in another way than it is read, for a warning; empty if nothing.
-  virtual std::string doubt() const { return {}; }
+  /// What in the open file seems to be meant in another way than it is read, one warning each.
+  virtual std::vector<std::string> doubts() const { return {}; }
 
   /// Makes the values of the item available; false (with lastError()) when they cannot be read.
   virtual bool getData(int item) = 0;

@@ -72,14 +72,17 @@ void warnOfComparedComparison(const InternalConstraint& constraint, const SetupS
 void EquationCheck::checkConstraint(const InternalConstraint& constraint, const SetupSection& section) const {
   const std::pair<std::string_view, const std::string&> sides[] = {{"Left_Equation", constraint.leftEquation},
                                                                    {"Right_Equation", constraint.rightEquation}};
+  bool namesParameter = false;
   for (const auto& [keyword, equation] : sides) {
     try {
-      evaluator_->compile(equation);
+      const auto compiled = evaluator_->compile(equation);
+      namesParameter = namesParameter || !compiled->variables().empty();
     } catch (const FatalError& error) {
       section.refuse("Error: Invalid equation for internal constraints", keyword,
                      fmt::format("{}\n{}", error.message(), error.detail()));
     }
   }
+  if (!namesParameter) section.warn("Left_Equation", "no side of the constraint names a parameter");
   warnOfComparedComparison(constraint, section);
 }
 

@@ -355,7 +355,8 @@ const SettingSection<RunConfig>& measureFileSection() {
            {.name = "File_Name",
             .type = KeywordType::fileName,
             .defaultValue = "''",
-            .meaning = "In or below the base folder; required where a measure has interface type 1."})}}};
+            .meaning = "In or below the base folder; required where a measure has interface type 1, otherwise "
+                       "without effect."})}}};
   return section;
 }
 

@@ -28,6 +28,11 @@ bool RunConfig::usesExactMeasures() const {
                      [](const OutputMeasure& measure) { return measure.interfaceType == InterfaceType::timeSeries; });
 }
 
+bool RunConfig::readsMeasureFile() const {
+  return std::any_of(measures.begin(), measures.end(),
+                     [](const OutputMeasure& measure) { return measure.interfaceType == InterfaceType::measureFile; });
+}
+
 std::size_t RunConfig::variableParameterCount() const {
   return static_cast<std::size_t>(std::count_if(
       parameters.begin(), parameters.end(),

@@ -44,7 +44,7 @@ struct RunConfig {
   AggregationMethod aggregationMethod = AggregationMethod::none;
   double minimumCoverage = 0.0;  ///< share of the first successful run's pairs below which a model run fails
   std::vector<OutputMeasure> measures;
-  std::string measureFile;
+  std::string measureFile;  ///< may be given though no measure reads it
   std::vector<ObjectiveFunction> objectives;
   std::vector<SavedOutputFile> savedOutputFiles;
 
@@ -68,6 +68,8 @@ struct RunConfig {
   bool keepsSimulatedValues() const { return task && task->keepsSimulatedValues(); }
   /// Whether the task uses output measures in 64 bits that differ from those in the rows.
   bool usesExactMeasures() const;
+  /// Whether an output measure is of interface type 1.
+  bool readsMeasureFile() const;
   /// "Parameter optimisation: Dynamically Dimensioned Search"; "none" without a task.
   std::string taskDescription() const { return task ? task->description() : "none"; }
   std::size_t variableParameterCount() const;

@@ -67,6 +67,11 @@ void warnOfParameters(const RunConfig& config, const SectionsRead& sections) {
       sections.parameters[i].warn("Parameter_Equation",
                                   "not used, as only Parameter_Type = 2 makes a parameter dependent");
     }
+    if (parameter.parameterType == ParameterType::dependent &&
+        parameter.transformationType == TransformationType::integer) {
+      sections.parameters[i].warn("Transformation_Type",
+                                  "has no effect on a dependent parameter: its value is that of its equation");
+    }
     if (parameter.parameterType != ParameterType::variable) continue;
     warnOffGrid(parameter, parameter.initialValue, "Initial_Value", sections.parameters[i]);
     warnOffGrid(parameter, parameter.upperBound, "Upper_Bound", sections.parameters[i]);
@@ -90,6 +95,11 @@ void warnOfMeasures(const RunConfig& config, const SectionsRead& sections) {
                                 "the observed series is in the file of the simulated one, which the model writes");
     }
   }
+}
+
+void warnOfMeasureFile(const RunConfig& config, const SectionsRead& sections) {
+  if (trim(config.measureFile).empty() || config.readsMeasureFile()) return;
+  sections.measureFile->warn("File_Name", "has no effect, as no output measure has Interface_Type = 1");
 }
 
 /// Whether the value of an objective function becomes ever better the further a measure is below 0.
@@ -130,6 +140,12 @@ void warnOfSearch(const RunConfig& config, const SectionsRead& sections) {
 }
 
 void warnOfObjectives(const RunConfig& config, const SectionsRead& sections) {
+  for (const SetupSection& section : sections.objectives) {
+    for (const std::string_view keyword : {"Standard_Deviation", "Location"}) {
+      if (config.aggregationMethod != AggregationMethod::none || !section.isWritten(keyword)) continue;
+      section.warn(keyword, "has no effect with Aggregation_Method = 0");
+    }
+  }
   const bool isWeighted = std::any_of(config.objectives.begin(), config.objectives.end(),
                                       [](const ObjectiveFunction& objective) { return objective.weight != 0.0; });
   if (isWeighted || config.objectives.empty()) return;
@@ -140,8 +156,10 @@ void warnOfCoverage(const RunConfig& config, const SectionsRead& sections) {
   const bool comparesSeries =
       std::any_of(config.measures.begin(), config.measures.end(),
                   [](const OutputMeasure& measure) { return measure.interfaceType == InterfaceType::timeSeries; });
-  if (!(config.minimumCoverage > 0.0) || comparesSeries) return;
-  sections.judgement->warn("Minimum_Coverage", "has no effect, as no output measure compares series");
+  if (comparesSeries) return;
+  constexpr std::string_view kReason = "has no effect, as no output measure compares series";
+  if (config.minimumCoverage > 0.0) sections.judgement->warn("Minimum_Coverage", kReason);
+  if (config.period.largestGapHours > 0.0) sections.judgement->warn("Largest_Gap", kReason);
 }
 
 void warnOfProcessFolder(const RunConfig& config, const SectionsRead& sections) {
@@ -165,6 +183,7 @@ void warnOfDoubtfulSettings(const RunConfig& config, const SectionsRead& section
   warnOfIdValues(config, sections);
   warnOfParameters(config, sections);
   warnOfMeasures(config, sections);
+  warnOfMeasureFile(config, sections);
   warnOfObjectives(config, sections);
   warnOfCoverage(config, sections);
   if (config.task && config.task->hasFinalRun()) warnOfSearch(config, sections);

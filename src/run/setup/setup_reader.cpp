@@ -359,12 +359,9 @@ void SetupReader::readMeasureFile() {
   const SetupSection section = target_.open("ObjectiveFunctions").open("OUTPUT_MEASURES").open("OUTPUT_MEASURE_FILE");
   section.read(measureFileSection(), config_);
   sections_.measureFile = section;
-  const bool isNeeded = std::any_of(config_.measures.begin(), config_.measures.end(), [](const OutputMeasure& measure) {
-    return measure.interfaceType == InterfaceType::measureFile;
-  });
   if (!config_.measureFile.empty()) {
     validateInBaseFolder(config_.measureFile, config_.baseFolder, "File_Name", section);
-  } else if (isNeeded) {
+  } else if (config_.readsMeasureFile()) {
     section.refuse("Error: File containing output measures not defined", "File_Name",
                    "expected the name of a file, since an output measure has Interface_Type = 1");
   }

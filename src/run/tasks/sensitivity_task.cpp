@@ -121,6 +121,10 @@ Linearised linearised(const TaskContext& context, const LocalSensitivity& sensit
       result.problem = "no objective function compares time series";
       return result;
     }
+    if (std::ranges::all_of(compared.weights, [](double weight) { return weight == 0.0; })) {
+      result.problem = "0 observations count, as the weights of all measures that compare series are 0";
+      return result;
+    }
     result.model = linearise(sensitivity.plan, compared.simulated, compared.observed, std::move(compared.weights));
     if (result.model) {
       result.model->series = std::move(compared.series);

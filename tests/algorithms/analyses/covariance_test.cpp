@@ -66,7 +66,8 @@ TEST(ParameterCovariance, LeavesOutWhatHasNoVarianceByName) {
   EXPECT_THAT(formatCovariance(result, space, space.initial),
               ::testing::IsSupersetOf<std::string>(
                   {"Parameter covariance: 5 observations, 2 parameters, 3 degrees of freedom",
-                   "Warning: Parameter b2 is left out of the covariance matrix: no simulated value depends on it",
+                   "Warning: Parameter b2 is left out of the covariance matrix: no simulated value changes with its "
+                   "step; if it has an effect, a larger step or more digits in the model's output show it",
                    "Warning: Parameter b3 is left out of the covariance matrix: its derivatives are not known",
                    "Warning: Parameter b5 is left out of the covariance matrix: its effect cannot be told from that of "
                    "the parameters before it"}));

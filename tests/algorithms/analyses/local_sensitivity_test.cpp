@@ -266,6 +266,23 @@ TEST(LocalSensitivity, LeavesAFailedRunsColumnOutByNameOrUsesTheOtherSide) {
       Contains("Warning: Parameter p1: evaluation 3 failed: the batch ran out of time: the difference is one-sided"));
 }
 
+TEST(LocalSensitivity, SaysWhatChangesNoMeasure) {
+  // The output of the first parameter is rounded, the second one is at its optimum, the third one has no effect.
+  FunctionEvaluator evaluator([](const ParameterSet& p) {
+    EvaluationResult result;
+    result.measureValues = {std::round(10.0 * p[0]) + (p[1] - 1.0) * (p[1] - 1.0)};
+    return result;
+  });
+  const SearchSpace space = spaceOf({{kNone, 2, 0, 4}, {kNone, 1, 0, 10}, {kNone, 1, 0, 10}});
+  const auto said = [&](double fraction, std::size_t j) {
+    return localSensitivity({kCentral, kOfRange, fraction}, space, evaluator).plan.differences[j].warnings;
+  };
+  EXPECT_THAT(said(0.01, 0), ElementsAre(StartsWith("no output measure changes with its step: ")));
+  EXPECT_THAT(said(0.1, 0), ::testing::IsEmpty());
+  EXPECT_THAT(said(0.01, 1), ::testing::IsEmpty());
+  EXPECT_THAT(said(0.1, 2), ::testing::SizeIs(1));
+}
+
 // At the optimum the derivative of the error is 0 for the parameter that matters most.
 TEST(LocalSensitivity, RanksByTheObservationsWhereThereAreSome) {
   FunctionEvaluator evaluator([](const ParameterSet& p) {

@@ -88,7 +88,7 @@ const SearchSpace kSpace{{"k", "layers", "n"},
 TEST(InitialSample, ReadsASampleOnTheModelScaleWithColumnsInAnyOrder) {
   for (const std::string text :
        {"# made by hand\n\nn layers k\n0.5 4 1\n 1\t1  0.1 \n", "\xEF\xBB\xBFn,layers,k\r\n0.5,4,1\r\n1,1,0.1",
-        "n;layers; k\n0.5; 4; 1\n1;1;0.1\n", "n\tlayers\tk\n5D-1\t4\t1\n1\t1\t0.1\n"}) {
+        "\"n\";layers; \"k\"\n0.5; 4; 1\n1;1;0.1\n", "n\tlayers\tk\n5D-1\t4\t1\n1\t1\t0.1\n"}) {
     const auto sample = readInitialSample("s.txt", text, kSpace);
     ASSERT_EQ(sample.sets.size(), 2U) << text;
     EXPECT_THAT(sample.sets[0], ElementsAre(DoubleEq(0.0), 4, 0.5)) << text;

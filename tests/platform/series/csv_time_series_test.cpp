@@ -148,13 +148,39 @@ TEST(CsvTimeSeries, AFirstItemThatIsCalledLikeATimeOfDayIsDoubted) {
   CsvTimeSeries series;
   for (const char* heading : {"hour", " HOUR ", "Time (UTC)", "\"HH:MM\"", "time_of_day"}) {
     ASSERT_TRUE(series.parse("s.csv", fmt::format("date,{},Q\n2001-01-01,12,1\n2001-01-02,12,1\n", heading)));
-    EXPECT_THAT(series.doubt(), HasSubstr(" and is read as item No. 1, not as a part of the time; ")) << heading;
+    EXPECT_THAT(series.doubts(), ElementsAre(HasSubstr(" and is read as item No. 1, not as a part of the time; ")));
   }
   for (const char* content :
        {"date,hourly,Q\n2001-01-01,12,1\n", "date,hour\n2001-01-01,12\n", "date,Q,hour\n2001-01-01,1,12\n",
         "date,hour,Q\n2001-01-01 06:00,12,1\n", "date,hour,Q\n2001-01-01,12,1\n2001-01-01 06:00,12,1\n"}) {
     ASSERT_TRUE(series.parse("s.csv", content));
-    EXPECT_EQ(series.doubt(), "") << content;
+    EXPECT_THAT(series.doubts(), IsEmpty()) << content;
+  }
+}
+
+TEST(CsvTimeSeries, CommentsThatSeemToMarkMissingValuesAreDoubted) {
+  // warning: none where it is empty
+  const std::pair<const char*, const char*> cases[] = {
+      {"# missing: -999",
+       "s.csv:2: this comment marks no missing values; if -999 is one, the line must be \"# missing"},
+      {"# Missing value = -999", "must be \"# missing = -999\""},
+      {"# missing -99.99", "must be \"# missing = -99.99\""},
+      {"# NODATA = -99.99", "must be \"# missing = -99.99\""},
+      {"# No-data value: -1e30 (gauge)", "must be \"# missing = -1e30\""},
+      {"# mising = -9", "must be \"# missing = -9\""},
+      {"# units: m3/s; missing = -999", "must be \"# missing = -999\""},
+      {"# missing = -99\n# missing = -9.5", "s.csv:3: -9.5 marks missing values, and no longer -99, as line 2 says"},
+      {"# missing = -99\n# missing = -99.0", ""},
+      {"# missing values are written as -99\n# missing = -99", ""},
+      {"# 12 days are missing in 2003", ""},
+      {"# missing days in 2003 were filled", ""},
+      {"# missing = nan\n# missing values: none", ""},
+  };
+  for (const auto& [comment, warning] : cases) {
+    CsvTimeSeries series;
+    ASSERT_TRUE(series.parse("s.csv", fmt::format("# Q\n{}\ntime,Q\n2001-01-01,12\n", comment)));
+    const std::size_t count = *warning == '\0' ? 0 : 1;
+    EXPECT_THAT(series.doubts(), AllOf(testing::SizeIs(count), testing::Each(HasSubstr(warning)))) << comment;
   }
 }
 
