@@ -2,6 +2,8 @@
 
 #include <utility>
 
+#include <fmt/core.h>
+
 #include "common/progress_messages.h"
 
 namespace mirevo {
