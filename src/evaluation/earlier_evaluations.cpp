@@ -25,9 +25,14 @@ std::optional<EvaluationResult> EarlierEvaluations::take(int number, std::span<c
   return result;
 }
 
-const std::vector<double>* EarlierEvaluations::measuresOfRepeated(int number) const {
+bool EarlierEvaluations::repeatsRun(int number) const {
   const auto found = records_.find(number);
-  return found != records_.end() && found->second.repeatsRun ? &found->second.result.measureValues : nullptr;
+  return found != records_.end() && found->second.repeatsRun;
+}
+
+const std::vector<double>* EarlierEvaluations::measuresOf(int number) const {
+  const auto found = records_.find(number);
+  return found == records_.end() ? nullptr : &found->second.result.measureValues;
 }
 
 void EarlierEvaluations::requireSameValues(int number, std::span<const double> earlier,

@@ -31,9 +31,9 @@ class EarlierEvaluations final {
   /// run evaluated another set under this number.
   std::optional<EvaluationResult> take(int number, std::span<const double> set);
   /// Whether the evaluation with this number needs a model run before its result is taken.
-  bool repeatsRun(int number) const { return measuresOfRepeated(number) != nullptr; }
-  /// Its measures then; otherwise nullptr.
-  const std::vector<double>* measuresOfRepeated(int number) const;
+  bool repeatsRun(int number) const;
+  /// Those of an evaluation that has not been taken; otherwise nullptr.
+  const std::vector<double>* measuresOf(int number) const;
 
   /// The evaluations whose model is run again for the output files that it leaves; their results are the earlier ones.
   void runAgain(std::set<int> numbers) { runAgain_ = std::move(numbers); }

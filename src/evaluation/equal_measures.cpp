@@ -61,7 +61,8 @@ std::optional<std::string> EqualMeasures::findIn(std::span<const ParameterSet> s
   const auto isTrue = [](bool is) { return is; };
   const bool hasOneChanged = std::any_of(hasChanged_.begin(), hasChanged_.end(), isTrue);
   isSettled_ = runCount_ > 0 && std::all_of(hasChanged_.begin(), hasChanged_.end(), isTrue);
-  const bool isEnough = sets.size() > 1 || otherCount_ + 1 >= kEnoughRuns || isLast;
+  // A measure may well be the same in a few runs, such as a count; hardly all of them.
+  const bool isEnough = (sets.size() > 1 && !hasOneChanged) || otherCount_ + 1 >= kEnoughRuns || isLast;
   if (isSettled_ || otherCount_ == 0 || !isEnough) return std::nullopt;
   // One measure may depend on a single parameter, and some tasks change one at a time.
   if (hasOneChanged && !isLast && !std::all_of(hasVaried_.begin(), hasVaried_.end(), isTrue)) return std::nullopt;

@@ -67,7 +67,8 @@ void EvaluationLedger::putBack(std::size_t place) {
 
 std::vector<double> EvaluationLedger::repeatedMeasures(std::size_t place) const {
   if (runAgain_.contains(place)) return results_[place].measureValues;
-  const auto* measures = earlier_ == nullptr || isFinalRun_ ? nullptr : earlier_->measuresOfRepeated(numberOf(place));
+  if (earlier_ == nullptr) return {};
+  const auto* measures = earlier_->measuresOf(numberOf(place));
   return measures == nullptr ? std::vector<double>() : *measures;
 }
 
@@ -112,11 +113,11 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
   if (known) {
     known->shownSeries = std::move(result.shownSeries);
     if (result.ok()) known->pairs = std::move(result.pairs);
-    if (!result.ok() && earlier_->repeatsRun(result.number)) {
+    if (!result.ok() && known->ok()) {
       observer_.warning(
-          fmt::format("{} was made again for its pairs: the model run failed: {}. Further runs are "
-                      "compared with the next successful one",
-                      progress::nameOfEvaluation(result.number), result.failure->reason));
+          fmt::format("{} was made again{}: the model run failed: {}", progress::nameOfEvaluation(result.number),
+                      isFinalRun_ ? "" : " for its pairs, and further runs are compared with the next successful one",
+                      result.failure->reason));
     }
     return replay(place, std::move(*known));
   }

@@ -125,7 +125,7 @@ ModelRunner::ModelRunner(ModelDescription description, ParameterModel& parameter
   settings.ownFiles = needs_.ownFiles();
   warnings_ = requireOwnFiles(description_.baseFolder, settings.ownFiles);
   readTemplates();
-  series_ = SeriesTables::MirevoTSobjectInit(description_.measures, description_.period);
+  series_ = SeriesTables::MirevoTSobjectInit(description_.measures, description_.period, description_.isForRuns);
   shownMeasures_ = measuresOfDistinctPairs(description_.measures);
   for (const OutputMeasure& measure : description_.measures) {
     if (measure.interfaceType != InterfaceType::measureFile) continue;

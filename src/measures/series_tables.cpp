@@ -94,7 +94,8 @@ std::unique_ptr<TimeSeriesObject> openTimeSeries(const std::string& fileName, co
 
 SeriesTables::SeriesTables() : reading_(std::make_shared<SeriesReading>()) {}
 
-SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> measures, const EvaluationPeriod& period) {
+SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> measures, const EvaluationPeriod& period,
+                                              bool isForRuns) {
   SeriesTables tables;
   std::vector<std::string> observationLocations;  // of the measure that names a file first
   std::vector<std::string> simulationLocations;
@@ -137,18 +138,18 @@ SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> mea
     tables.simulations_.push_back(open(tables.simulationNames_[i], simulationLocations[i], tables.simulationItems_[i]));
     tables.usualSizes_.push_back(sizeOf(tables.simulationNames_[i]));
   }
-  tables.checkItems(measures, period);
+  tables.checkItems(measures, period, isForRuns);
   tables.releaseSimulationFiles();
   return tables;
 }
 
-void SeriesTables::checkItems(std::span<const OutputMeasure> measures, const EvaluationPeriod& period) {
+void SeriesTables::checkItems(std::span<const OutputMeasure> measures, const EvaluationPeriod& period, bool isForRuns) {
   needsPairs_.assign(measures.size(), false);
   for (std::size_t i = 0; i < measures.size(); ++i) {
     if (observationIndex_[i] == kNoSeries) continue;
     requireItem(observation(i), measures[i].observation);
     const ObservedSeries observed = readObservedSeries(i, measures[i], period, SeriesPrecision::single, observation(i));
-    requireObservations(observed, measures[i], period);
+    if (isForRuns) requireObservations(observed, measures[i], period);
     warnOfMarkers(observed, measures[i]);
     // Files in the base folder that have no time steps yet tell nothing about their columns.
     if (simulation(i).timeStepCount() < 1) {

@@ -24,7 +24,9 @@ class SeriesTables final {
   /// Opens every observation file and, as a check, every simulation file, which it releases again. Measures of
   /// interface type 1 have no series. Item numbers that a file does not have and observations that cannot be read are
   /// also found here, before the first model run. Throws FatalError with the fixed texts.
-  static SeriesTables MirevoTSobjectInit(std::span<const OutputMeasure> measures, const EvaluationPeriod& period);
+  /// `isForRuns`: model runs follow, so that each measure needs observations in the period.
+  static SeriesTables MirevoTSobjectInit(std::span<const OutputMeasure> measures, const EvaluationPeriod& period,
+                                         bool isForRuns = true);
 
   /// Opens the simulation files of one evaluation: `paths[i]` is the copy of simulationFileNames()[i] in the slot's
   /// folder. Files still open are released first. Throws FatalError as openTimeSeries() does.
@@ -62,7 +64,7 @@ class SeriesTables final {
                            const EvaluationPeriod& period);
   /// If observations are a usual marker of missing values that is not marked as one.
   void warnOfMarkers(const ObservedSeries& observed, const OutputMeasure& measure);
-  void checkItems(std::span<const OutputMeasure> measures, const EvaluationPeriod& period);
+  void checkItems(std::span<const OutputMeasure> measures, const EvaluationPeriod& period, bool isForRuns);
 
   std::vector<std::string> observationNames_;
   std::vector<std::string> simulationNames_;

@@ -26,6 +26,7 @@ ModelDescription describeModel(const RunConfig& config) {
   model.savedFolder = runFilePath(config.setupFolder + "/" + config.setupName, run_files::kSavedFolder);
   model.failedFolderPrefix = runFilePath(processFolderPrefix(config), run_files::kFailedFolder);
   model.runsAtOnce = config.simultaneousSimulations;
+  model.isForRuns = config.task != nullptr;
   model.computeExactMeasures = config.usesExactMeasures();
   model.keepSimulatedValues = config.keepsSimulatedValues();
   if (config.task) model.keptPrecision = config.task->keptPrecision();

@@ -30,8 +30,8 @@ std::string openTerminationLog(const std::string& path) {
   std::string reason;
   std::error_code ignored;
   const bool isFile = std::filesystem::symlink_status(path, ignored).type() == std::filesystem::file_type::regular;
-  const std::string head = isFile ? readFileHead(path, reason).value_or(std::string()) : std::string();
-  if (!head.empty() && !isTerminationLog(head)) keepEarlierFile(path);
+  const auto head = isFile ? readFileHead(path, reason) : std::string();
+  if (!head || (!head->empty() && !isTerminationLog(*head))) keepEarlierFile(path);
   // Removed rather than emptied: an earlier run that is just ending then writes its last line to its own file.
   ::unlink(path.c_str());
   const int unit = ::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_APPEND | O_CLOEXEC, 0666);

@@ -103,6 +103,7 @@ void LeftProcesses::addSlot(const std::string& folder) {
 
 void LeftProcesses::begin(int slot) {
   slotAt(slot).isRunning = true;
+  slotAt(slot).hasEnded = false;
   slotAt(slot).endingSince.reset();
   slotAt(slot).left.clear();
 }
@@ -174,10 +175,16 @@ std::optional<LeftProcesses::Adopted> LeftProcesses::describe(pid_t id) const {
   return process;
 }
 
-/// Whether it is to be ended with the slot's batch.
-bool LeftProcesses::belongsTo(const Adopted& process, int slot) const {
-  if (process.slot > 0) return process.slot == slot;
-  return process.candidates.empty() || process.candidates.contains(slot);
+/// Whether the slot's batch is not over as long as the process is there.
+bool LeftProcesses::belongsTo(const Adopted& process, int slot) {
+  return process.slot > 0 ? process.slot == slot : process.candidates.empty() || process.candidates.contains(slot);
+}
+
+/// Whether one of the batches that may have started it has items that are running, and may need it.
+bool LeftProcesses::mayBelongToRunning(const Adopted& process) const {
+  return process.slot == 0 && std::any_of(process.candidates.begin(), process.candidates.end(), [this](int slot) {
+           return slotAt(slot).isRunning && !slotAt(slot).hasEnded;
+         });
 }
 
 void LeftProcesses::giveUp(pid_t id, Adopted& process, Slot& slot, std::string problem) {
@@ -202,10 +209,15 @@ void LeftProcesses::addKilled(int number, const std::string& batchFile, std::vec
 bool LeftProcesses::areGone(int number, const std::string& batchFile, double now) {
   Slot& slot = slotAt(number);
   look();
+  slot.hasEnded = true;
   bool areGone = true;
   for (auto& [id, process] : adopted_) {
     if (process.isGivenUp || !belongsTo(process, number)) continue;
-    if (!slot.endingSince) slot.endingSince = now;
+    if (mayBelongToRunning(process)) {
+      areGone = false;
+      continue;
+    }
+    if (!slot.endingSince || !process.isKilled) slot.endingSince = now;
     const auto isIt = [id = id](const LeftProcess& left) { return left.id == id; };
     if (std::none_of(slot.left.begin(), slot.left.end(), isIt)) {
       const auto found = findProcess(id);  // it may have become another program

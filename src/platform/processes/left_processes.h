@@ -26,9 +26,8 @@ struct LeftProcess {
 /// every process of a model that loses its own parent: whether a batch has left anything is then told by the list of
 /// the program's children, whatever a process did to its session or its environment, and without a look at the other
 /// processes of the machine. To which slot a process belongs is told by its mark, else by its folder, files or command
-/// line; one without such a sign is ended with the first batch that is over of those that were running when it was seen
-/// first, as it may write to the results of any. Slots
-/// count from 1.
+/// line; one without such a sign is ended when the batches that were running when it was seen first have ended, which
+/// are not over before. Slots count from 1.
 class LeftProcesses final {
  public:
   /// `isOwn`: whether a child is one that the program itself started and waits for.
@@ -68,7 +67,8 @@ class LeftProcesses final {
   };
   struct Slot {
     std::string folder;
-    bool isRunning = false;
+    bool isRunning = false;  ///< from the batch's begin until nothing of it is left
+    bool hasEnded = false;   ///< its items have
     std::optional<double> endingSince;
     std::vector<LeftProcess> left;
   };
@@ -78,7 +78,8 @@ class LeftProcesses final {
   std::vector<pid_t> children() const;
   bool lookOnce();
   std::optional<Adopted> describe(pid_t id) const;
-  bool belongsTo(const Adopted& process, int slot) const;
+  static bool belongsTo(const Adopted& process, int slot);
+  bool mayBelongToRunning(const Adopted& process) const;
   static void giveUp(pid_t id, Adopted& process, Slot& slot, std::string problem);
 
   const ProcessMark& mark_;

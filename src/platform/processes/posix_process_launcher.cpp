@@ -288,6 +288,7 @@ void PosixProcessLauncher::createProcesses(int slotNumber) {
   slot.isEnding = true;
   left_->begin(slotNumber);
   slot.started = clock_();
+  slot.unseen = 0.0;
   slot.overdue.reset();
   if (!renewLog(slot)) {
     slot.failure = {
@@ -317,8 +318,7 @@ void PosixProcessLauncher::startItem(Slot& slot) {
 }
 
 void PosixProcessLauncher::excludeTime(double seconds) {
-  const double now = clock_();
-  for (Slot& slot : slots_) slot.started = std::min(slot.started + seconds, now);
+  for (Slot& slot : slots_) slot.unseen += seconds;
 }
 
 void PosixProcessLauncher::isExecuting(int slotNumber, std::int32_t& executing, std::int32_t& status) {
@@ -341,6 +341,7 @@ void PosixProcessLauncher::isExecuting(int slotNumber, std::int32_t& executing, 
     const std::string last = baseName(slot.commands[slot.item].file());
     slot.isEnding = !left_->areGone(slotNumber, last, clock_());
   }
+  slot.unseen = 0.0;
   executing = slot.group > 0 || slot.isEnding ? 1 : 0;
   status = static_cast<std::int32_t>(slot.failure.kind == BatchFailure::Kind::none ? BatchStatus::succeeded
                                                                                    : BatchStatus::failed);
@@ -364,6 +365,7 @@ void PosixProcessLauncher::finishItem(Slot& slot, int code, int status) {
         fmt::format("{} exited with code {}{}", name, status, meaningOfCode(status, slot.commands[slot.item].file()))};
   } else if (slot.item + 1 < slot.commands.size()) {
     ++slot.item;
+    slot.started = std::min(slot.started + slot.unseen, clock_());
     startItem(slot);
   }
 }

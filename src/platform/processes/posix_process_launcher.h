@@ -59,6 +59,7 @@ class PosixProcessLauncher final : public ProcessLauncher {
     bool isEnding = false;               ///< no item runs, and what the batch has left may not be gone yet
     std::string mark;                    ///< in the environment of its processes
     double started = 0.0;                ///< when the batch began
+    double unseen = 0.0;                 ///< seconds without a look at the batch, since the last one
     std::optional<double> overdue;       ///< when it was sent SIGTERM because it ran too long
     int log = -1;  ///< open for the whole run, so that a model run that prints nothing creates no file
     BatchFailure failure;

@@ -92,7 +92,8 @@ class ProcessLauncher {
 
   /// Waits until a running batch has changed its state, a signal arrives, or `seconds` have passed.
   virtual void waitForChange(double seconds) = 0;
-  /// Time that the program has just spent otherwise does not count as that of the batches that are running.
+  /// For so long the program has not looked at its batches: an item that ended meanwhile has kept the next one waiting,
+  /// which does not count as time of the batch.
   virtual void excludeTime(double seconds) { static_cast<void>(seconds); }
 
   /// Ends every process that was started and is still running, and returns when they are gone.

@@ -108,7 +108,9 @@ std::string_view numberMeantAsMissing(std::string_view comment) {
       const std::string_view rest = trim(comment.substr(end));
       const bool endsPhrase =
           rest.empty() || std::string_view(";,.)(]\"'#").find(rest.front()) != std::string_view::npos;
-      if (endsPhrase && parseReal(number)) return number;
+      // A positive number may well be a count: "missing values: 14".
+      const bool isMarker = number.front() == '-' || number.find_first_of("012345678eE") == std::string_view::npos;
+      if (endsPhrase && isMarker && parseReal(number)) return number;
       if (number.find_first_of("0123456789") != std::string_view::npos) isAnnounced = false;
     }
     i = end;
