@@ -2,6 +2,8 @@
 
 #include <algorithm>
 #include <array>
+#include <cerrno>
+#include <cstring>
 #include <filesystem>
 #include <optional>
 #include <string_view>
@@ -117,6 +119,7 @@ std::string whyNotReplaceable(const std::string& path, const RunFile& file) {
   } else if (type == std::filesystem::file_type::regular) {
     std::string reason;
     const auto head = readFileHead(path, reason);
+    if (!head && reason == std::strerror(ENOENT)) return {};  // another run has just renamed it
     if (!head) return unreadable(reason);
     isOfRun = !isFolder && (isOfSomeRun(*head, file) || isPartOfHead(*head, file));
   }

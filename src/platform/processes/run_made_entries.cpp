@@ -1,6 +1,8 @@
 #include "platform/processes/run_made_entries.h"
 
 #include <algorithm>
+#include <cerrno>
+#include <cstring>
 #include <filesystem>
 #include <sys/stat.h>
 #include <system_error>
@@ -33,7 +35,12 @@ bool matches(std::string_view text, const RunFile& file) {
 /// Whether the content is that of a run's file, too. A link is followed: a run makes none.
 bool isMadeByRun(const std::string& path, const RunFile& file) {
   // An empty file of so plain a name may be the model's.
-  if (file.mayBeModels && !path.ends_with(kTemporaryEnding)) return carriesMark(path, file);
+  if (file.mayBeModels && !path.ends_with(kTemporaryEnding)) {
+    std::string reason;
+    const auto head = readFileHead(path, reason);
+    // What has vanished since the folder was listed is what a run renames, and what comes under its name is new.
+    return head ? head->find(file.mark) != std::string::npos : reason == std::strerror(ENOENT);
+  }
   std::error_code failed;
   const std::string target = std::filesystem::canonical(path, failed).string();
   return whyNotReplaceable(failed ? path : target, file).empty();
