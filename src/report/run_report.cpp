@@ -94,6 +94,12 @@ ReportData ReportBuilder::build() {
     note(fmt::format("The results name another setup, {}. They are of that one, unless this is its new name.",
                      sources_.setup));
   }
+  if (isLaterVersion(sources_.record.program)) {
+    note(fmt::format(
+        "The results are of Mirevo {}, a later version than this one, {}, which may not know all that is in "
+        "them.",
+        sources_.record.program, programVersion()));
+  }
   if (!sources_.recordFault.empty()) {
     note(fmt::format("How the run ended is taken from its results alone: {}.", sources_.recordFault));
   }

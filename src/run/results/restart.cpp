@@ -11,6 +11,7 @@
 #include "common/files.h"
 #include "common/replaceable_files.h"
 #include "common/run_files.h"
+#include "common/version.h"
 #include "run/results/restart_settings.h"
 #include "run/results/row_check.h"
 #include "run/results/row_checksums.h"
@@ -47,6 +48,18 @@ RestartSettings readSettings(const std::string& path) {
            run_files::kPlain.restart);
   }
   return *std::move(settings);
+}
+
+/// First of all: what else is said of the files might be for want of knowing them.
+void refuseLaterVersion(const std::string& settingsFile, const std::optional<RunRecord>& record) {
+  const auto settings = parseRestartSettings(readFileIfThere(settingsFile).value_or(""));
+  for (const std::string& version : {settings ? settings->program : std::string(), record ? record->program : ""}) {
+    if (!isLaterVersion(version)) continue;
+    refuse(
+        fmt::format("its results are of Mirevo {0}, and this is Mirevo {1}, which may not know all that they depend "
+                    "on. Mirevo {0} or a later version continues the run.",
+                    version, programVersion()));
+  }
 }
 
 void requireSameSettings(const RestartSettings& then, const RestartSettings& now) {
@@ -109,6 +122,8 @@ void dropFailuresAtEnd(EarlierRun& run) {
 /// findEarlierRun() of a result file with this text.
 std::optional<EarlierRun> earlierRunIn(const std::string& text, const RestartFiles& files, const RunConfig& config,
                                        const ResultColumns& columns, std::optional<RunRecord> record) {
+  if (text.empty()) return std::nullopt;
+  refuseLaterVersion(files.settings, record);
   ResultTable table = readResultTable(text, columns);
   // Not just a cut-off beginning: there may be days of work below a damaged header row.
   if (!table.hasHeader && table.unusableLines > 1) {

@@ -1,7 +1,9 @@
 #include "run/results/restart_settings.h"
 
 #include <algorithm>
+#include <array>
 #include <charconv>
+#include <cstddef>
 #include <filesystem>
 #include <map>
 #include <unordered_map>
@@ -18,6 +20,7 @@
 namespace mirevo {
 namespace {
 
+constexpr std::string_view kProgramLine = "Program";
 constexpr std::string_view kSettingLine = "Setting";
 constexpr std::string_view kFileLine = "File";
 constexpr std::string_view kSearchLine = "Search";
@@ -45,6 +48,12 @@ std::optional<std::uint64_t> unsignedNumber(std::string_view text, int base) {
 
 /// Reads one line of the file; false if it is invalid.
 bool readLine(std::string_view line, RestartSettings& settings) {
+  if (line.starts_with(kProgramLine)) {
+    auto cells = cellsOf(line, 1);
+    if (cells.empty()) return false;
+    settings.program = std::move(cells[1]);
+    return true;
+  }
   if (line.starts_with(kSettingLine)) {
     auto cells = cellsOf(line, 3);
     if (cells.empty()) return false;
@@ -70,6 +79,16 @@ bool readLine(std::string_view line, RestartSettings& settings) {
     return true;
   }
   return line.empty() || line.front() == '#';
+}
+
+/// Of "0.2.0", also with something behind it; zeros of anything else.
+std::array<int, 3> numbersOf(std::string_view version) {
+  std::array<int, 3> numbers{};
+  const std::vector<std::string_view> parts = splitAt(version, '.', numbers.size());
+  for (std::size_t i = 0; i < parts.size(); ++i) {
+    std::from_chars(parts[i].data(), parts[i].data() + parts[i].size(), numbers[i]);
+  }
+  return numbers;
 }
 
 using SettingIndex = std::map<std::pair<std::string_view, std::string_view>, const ResultSetting*>;
@@ -101,7 +120,7 @@ std::string shownSection(const SettingIndex& index, std::string_view section) {
 }  // namespace
 
 RestartSettings restartSettings(const RunConfig& config) {
-  RestartSettings result{config.resultSettings, {}, {}};
+  RestartSettings result{std::string(programVersion()), config.resultSettings, {}, {}};
   if (config.task) result.searches = config.task->earlierSearches();
   std::unordered_map<std::string, FileMark> known;  // many measures may name one file
   for (const ResultSetting& setting : result.settings) {
@@ -122,6 +141,7 @@ std::string formatRestartSettings(const RestartSettings& settings) {
       "# What the results beside this file depend on, as it was when they were computed by Mirevo {}.\n"
       "# A run with Restart = 1 holds its setup against it.\n",
       programVersion());
+  if (!settings.program.empty()) text += fmt::format("{}\t{}\n", kProgramLine, settings.program);
   for (const ResultSetting& setting : settings.settings) {
     text += fmt::format("{}\t{}\t{}\t{}\n", kSettingLine, setting.section, setting.keyword, setting.value);
   }
@@ -139,9 +159,13 @@ std::optional<RestartSettings> parseRestartSettings(std::string_view text) {
   RestartSettings settings;
   for (const std::string_view line : splitLines(text)) {
     if (line == kLastLine) return settings;
-    if (!readLine(line, settings)) return std::nullopt;
+    if (!readLine(line, settings) && !isLaterVersion(settings.program)) return std::nullopt;
   }
   return std::nullopt;
+}
+
+bool isLaterVersion(std::string_view version) {
+  return numbersOf(version) > numbersOf(programVersion());
 }
 
 std::optional<int> searchBudget(const RestartSettings& settings) {

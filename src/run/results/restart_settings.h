@@ -22,6 +22,7 @@ struct FileMark {
 /// All that the results of a run depend on, except the model itself. It is kept beside the results, so that a run is
 /// not continued with other settings.
 struct RestartSettings {
+  std::string program;  ///< the version that wrote them; empty: 0.1.0, which did not say it
   std::vector<ResultSetting> settings;
   std::vector<FileMark> files;
   std::vector<EarlierSearch> searches;
@@ -31,8 +32,11 @@ struct RestartSettings {
 RestartSettings restartSettings(const RunConfig& config);
 
 std::string formatRestartSettings(const RestartSettings& settings);
-/// Empty for a text that is not such a file or is cut off.
+/// Empty for a text that is not such a file or is cut off. In one of a later version lines may be unknown.
 std::optional<RestartSettings> parseRestartSettings(std::string_view text);
+
+/// Whether the version is a later one than this program's, which may then not know all that is in its files.
+bool isLaterVersion(std::string_view version);
 
 /// What has changed, one line each, "Upper_Bound of PARAMETER_3 (X3): 1200 then, 1000 now"; a raised budget of a search
 /// (`Max_No_Evaluations`) is not a change.

@@ -100,6 +100,13 @@ TEST_F(RestartSettingsTest, ACutOrDamagedFileIsNotTakenForSettings) {
   }
 }
 
+TEST_F(RestartSettingsTest, ALaterVersionIsToldByItsNumbers) {
+  for (const char* version : {"99.0.0", "0.99.0-rc1", "99"}) EXPECT_TRUE(isLaterVersion(version)) << version;
+  for (const char* version : {"", "0.1.99", "0.2.0", "x", ".", "99999999999.0.0"}) {
+    EXPECT_FALSE(isLaterVersion(version)) << version;
+  }
+}
+
 /// A run whose result file holds the rows that a test gives it.
 class EarlierRunTest : public SetupFixture {
  protected:
