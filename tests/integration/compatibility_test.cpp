@@ -117,6 +117,27 @@ TEST_P(Compatibility, AReportOfResultsOfAnEarlierVersionHasTheSameNotes) {
   EXPECT_EQ(lines(page.substr(notes, page.find(']', notes) + 1 - notes)), lines(folder_.read("notes.dat")));
 }
 
+/// A keyword that was required may have a default since.
+TEST(CompatibilityOfSetups, KeywordsTheirDefaultsAndNamesOfValuesStay) {
+  const std::string reference = TemporaryFolder::readFile(MIREVO_SOURCE_DIR "/docs/setup-reference.md");
+  for (const auto& version : fs::directory_iterator(kReleased)) {
+    if (!version.is_directory()) continue;
+    std::ifstream keywords(version.path() / "keywords");
+    std::string section;
+    for (std::string line; std::getline(keywords, line);) {
+      if (line.starts_with("## ")) {
+        const std::size_t at = reference.find("\n" + line + "\n");
+        ASSERT_NE(at, std::string::npos) << version << ": " << line;
+        section = reference.substr(at, reference.find("\n## ", at + 1) - at);
+      } else {
+        EXPECT_NE(section.find("\n" + line), std::string::npos)
+            << version << ": " << section.substr(1, 60) << " ... " << line;
+      }
+    }
+    EXPECT_NE(section, "") << version;
+  }
+}
+
 class CompatibilityOfLaterVersions : public Compatibility {};
 
 TEST_P(CompatibilityOfLaterVersions, ResultsOfALaterVersionAreRefusedByItsName) {
