@@ -62,6 +62,13 @@ TEST_F(RestartSettingsTest, AKeywordThatAnEarlierVersionDidNotKnowWorkedAsItsDef
   EXPECT_THAT(changedSettings(then, now), IsEmpty());
 }
 
+TEST_F(RestartSettingsTest, ALaterVersionIsToldByItsNumbers) {
+  for (const char* version : {"99.0.0", "0.99.0-rc1", "99"}) EXPECT_TRUE(isLaterVersion(version)) << version;
+  for (const char* version : {"", "0.1.99", "0.2.0", "x", ".", "99999999999.0.0"}) {
+    EXPECT_FALSE(isLaterVersion(version)) << version;
+  }
+}
+
 TEST_F(RestartSettingsTest, ANameThatIsCutOffIsNotShown) {
   RestartSettings then = restartSettings(read());
   RestartSettings now = then;
@@ -97,13 +104,6 @@ TEST_F(RestartSettingsTest, ACutOrDamagedFileIsNotTakenForSettings) {
   }
   for (const char* line : {"Setting\ta\tb", "File\ta\tb\t1\tx\tname", "Search\t5\t6", "Search\t5\t0", "Serch\t5\t4"}) {
     EXPECT_FALSE(parseRestartSettings(std::string(line) + "\nEnd\n")) << line;
-  }
-}
-
-TEST_F(RestartSettingsTest, ALaterVersionIsToldByItsNumbers) {
-  for (const char* version : {"99.0.0", "0.99.0-rc1", "99"}) EXPECT_TRUE(isLaterVersion(version)) << version;
-  for (const char* version : {"", "0.1.99", "0.2.0", "x", ".", "99999999999.0.0"}) {
-    EXPECT_FALSE(isLaterVersion(version)) << version;
   }
 }
 
