@@ -18,10 +18,9 @@
 #include <utility>
 #include <vector>
 
-#include <fmt/core.h>
-
 #include "common/files.h"
 #include "common/reading_watch.h"
+#include "platform/processes/child_process.h"
 #include "platform/processes/close_descriptors.h"
 
 namespace mirevo {
@@ -91,15 +90,9 @@ bool HelperProcess::start(void (*serve)(int), std::string& reason) {
     return false;
   }
   const pid_t parent = ::getpid();
-  // Blocked during the fork, so that no handler of the program ever runs in the helper.
-  sigset_t all;
-  sigset_t before;
-  ::sigfillset(&all);
-  ::sigprocmask(SIG_SETMASK, &all, &before);
-  process_ = ::fork();
+  process_ = forkWithSignalsBlocked();
   if (process_ == 0) runHelper(parent, sockets[1], serve);
   const int error = errno;
-  ::sigprocmask(SIG_SETMASK, &before, nullptr);
   ::close(sockets[1]);
   if (process_ > 0) {
     unreapedHelpers().push_back(process_);
@@ -131,12 +124,7 @@ void HelperProcess::end() {
 std::string HelperProcess::endAndDescribe() {
   if (socket_ >= 0) ::close(std::exchange(socket_, -1));
   const int status = reap(std::exchange(process_, 0));
-  if (status != -1 && WIFSIGNALED(status)) {
-    const char* description = ::sigdescr_np(WTERMSIG(status));
-    return fmt::format("was ended by signal {}{}", WTERMSIG(status),
-                       description == nullptr ? "" : fmt::format(" ({})", description));
-  }
-  return "has ended";
+  return status != -1 && WIFSIGNALED(status) ? endedBySignal(WTERMSIG(status)) : "has ended";
 }
 
 HelperProcess::Outcome HelperProcess::send(const void* bytes, std::size_t size, ReadingWatch& watch) {
