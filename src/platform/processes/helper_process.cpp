@@ -68,11 +68,10 @@ int reap(pid_t process) {
   int status = -1;
   for (int nap = 0; nap < kMostNaps; ++nap) {
     const pid_t ended = ::waitpid(process, &status, WNOHANG);
-    if (ended == process) {
+    if (ended == process || (ended < 0 && errno != EINTR)) {  // in the second case something else has reaped it
       std::erase(unreapedHelpers(), process);
-      return status;
+      return ended == process ? status : -1;
     }
-    if (ended < 0 && errno != EINTR) break;
     ::nanosleep(&kNap, nullptr);
   }
   return -1;
