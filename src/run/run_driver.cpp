@@ -527,8 +527,7 @@ void RunDriver::finish(const TaskOutcome& outcome) {
 }
 
 std::string RunDriver::warningCountText() const {
-  const int count = state_.log.warningCount();
-  return count == 1 ? std::string("1 warning") : fmt::format("{} warnings", count);
+  return countText(static_cast<std::size_t>(state_.log.warningCount()), "warning");
 }
 
 std::string RunDriver::whereWarningsAre() const {
