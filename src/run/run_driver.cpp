@@ -214,7 +214,7 @@ void RunDriver::logSetup() {
     for (const std::string& text : config_.task->warnings(parameters_->searchSpace())) state_.log.warning(text);
   }
   for (const std::string& text : runner_->warnings()) state_.log.warning(text);
-  for (const std::string& text : runner_->seriesWarnings()) state_.log.warning(text);
+  for (const std::string& text : runner_->output().warnings()) state_.log.warning(text);
   for (const std::string& text :
        unusedParameterWarnings(config_.parameters, config_.constraints, runner_->templates())) {
     state_.log.warning(text);
@@ -234,13 +234,12 @@ void RunDriver::logSetup() {
 void RunDriver::openResults() {
   hasBegun_ = true;
   state_.objectiveValues.resize(config_.objectives.size());
-  results_->open(config_, runner_->observedSeries(), *aggregator_, state_.log);
+  results_->open(config_, runner_->output().observedSeries(), *aggregator_, state_.log);
   putEarlierReportAside();
   signalState.resultFileDescriptor = results_->table().descriptor();
-  reporter_ =
-      std::make_unique<RunReporter>(state_, results_->table(), results_->failedRuns(), parameters_->searchSpace(),
-                                    results_->simulatedValues(), &results_->pairs(), &results_->unkeptFiles(),
-                                    measureSources(config_.measures, config_.measureFile, config_.baseFolder));
+  reporter_ = std::make_unique<RunReporter>(state_, results_->table(), results_->failedRuns(),
+                                            parameters_->searchSpace(), results_->simulatedValues(), &results_->pairs(),
+                                            &results_->unkeptFiles(), runner_->output().sources());
   openSeries();
   failedRunPolicy_.emplace(config_.plannedEvaluations(), config_.failedRunFolders);
   EarlierEvaluations* const earlier = results_->earlierEvaluations();
@@ -270,8 +269,8 @@ void RunDriver::putEarlierReportAside() {
 
 /// An end without a time of day is the beginning of its day.
 void RunDriver::warnOfLastDay() {
-  for (const std::size_t i : runner_->shownMeasures()) {
-    const auto leftOut = runner_->observationLeftOut(i);
+  for (const std::size_t i : runner_->output().shownMeasures()) {
+    const auto leftOut = runner_->output().observationLeftOut(i);
     if (!leftOut) continue;
     state_.log.warning(fmt::format(
         "End_Date = {} is the beginning of its day: the later observations of that day are left out (output "
@@ -285,10 +284,10 @@ void RunDriver::warnOfLastDay() {
 std::vector<KeptSeries> RunDriver::keptSeries() const {
   constexpr double kSecondsPerDay = 86400.0;
   const bool isExact = config_.task && config_.task->keptPrecision() == SeriesPrecision::exact;  // units follow
-  const std::vector<std::size_t>& shown = runner_->shownMeasures();
+  const std::vector<std::size_t>& shown = runner_->output().shownMeasures();
   std::vector<KeptSeries> kept;
   std::size_t first = 0;
-  for (const ObservedSeries& observed : runner_->observedSeries()) {
+  for (const ObservedSeries& observed : runner_->output().observedSeries()) {
     if (std::find(shown.begin(), shown.end(), observed.measure) != shown.end()) {
       KeptSeries& series = kept.emplace_back();
       series.first = first;
@@ -304,15 +303,15 @@ void RunDriver::openSeries() {
   const std::string path = runFilePath(filePrefix_, run_files::kSeries);
   const bool goesOn = results_->earlierEvaluations() != nullptr;
   if (!goesOn) keepEarlierResults(std::array{path}, config_.setupFile, state_.log);
-  if (runner_->shownMeasures().empty()) return;
+  if (runner_->output().shownMeasures().empty()) return;
   RecordedSeries run;
   run.headLines = {
       columnName(config_.title), fmt::format("Mirevo {}", programVersion()), "Setup file: " + config_.setupFile,
       fmt::format("Evaluation period: {} to {}", formatDate(config_.period.start), formatDate(config_.period.end))};
   const std::string task = config_.task ? std::string(config_.task->facts().name.name) : std::string();
   run.task = task;
-  run.measures = seriesNames(config_.measures, runner_->shownMeasures());
-  run.observations = runner_->readShownObservations();
+  run.measures = seriesNames(config_.measures, runner_->output().shownMeasures());
+  run.observations = runner_->output().readShownObservations();
   run.periodFirst = secondNumber(config_.period.start);
   run.periodLast = secondNumber(config_.period.end);
   run.largestGap = config_.period.largestGapDays();
@@ -352,7 +351,7 @@ TaskContext RunDriver::taskContext() {
           state_.log,
           [this](const SearchSummary& summary) { reporter_->takeBestOf(summary); },
           filePrefix_,
-          runner_->observedSeries(),
+          runner_->output().observedSeries(),
           parameterFields(*parameters_, widestPlaceholders(runner_->templates(), config_.parameters.size())),
           [this](std::span<const double> values) { return aggregator_->aggregate(values); },
           parameters_->feasibility(),
