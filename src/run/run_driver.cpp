@@ -1,9 +1,7 @@
 #include "run/run_driver.h"
 
 #include <algorithm>
-#include <array>
 #include <cerrno>
-#include <cmath>
 #include <cstring>
 #include <filesystem>
 #include <new>
@@ -12,7 +10,6 @@
 
 #include <fmt/core.h>
 
-#include "common/calendar.h"
 #include "common/clock.h"
 #include "common/fatal_error.h"
 #include "common/file_lock.h"
@@ -24,7 +21,6 @@
 #include "common/version.h"
 #include "evaluation/local_evaluator.h"
 #include "evaluation/ranks/rank_evaluator.h"
-#include "measures/period_series.h"
 #include "platform/processes/posix_process_launcher.h"
 #include "platform/processes/process_folder.h"
 #include "platform/signals/signal_state.h"
@@ -34,6 +30,7 @@
 #include "run/results/record_file.h"
 #include "run/results/shared_files.h"
 #include "run/run_model.h"
+#include "run/run_series.h"
 #include "run/setup/setup_reader.h"
 #include "run/setup/setup_summary.h"
 #include "run/setup/setup_warnings.h"
@@ -240,9 +237,11 @@ void RunDriver::openResults() {
   reporter_ = std::make_unique<RunReporter>(state_, results_->table(), results_->failedRuns(),
                                             parameters_->searchSpace(), results_->simulatedValues(), &results_->pairs(),
                                             &results_->unkeptFiles(), runner_->output().sources());
-  openSeries();
-  failedRunPolicy_.emplace(config_.plannedEvaluations(), config_.failedRunFolders);
   EarlierEvaluations* const earlier = results_->earlierEvaluations();
+  series_ = openSeries(config_, parameters_->searchSpace(), runner_->output(),
+                       runFilePath(filePrefix_, run_files::kSeries), earlier != nullptr, state_.log);
+  if (series_) reporter_->recordSeries(*series_);
+  failedRunPolicy_.emplace(config_.plannedEvaluations(), config_.failedRunFolders);
   if (state_.job->hasWorkers()) {
     evaluator_ = std::make_unique<RankEvaluator>(*runner_, *state_.job, *reporter_, *failedRunPolicy_, earlier);
   } else {
@@ -265,81 +264,6 @@ void RunDriver::putEarlierReportAside() {
     }
     keepEarlierFile(path, state_.log);
   }
-}
-
-/// An end without a time of day is the beginning of its day.
-void RunDriver::warnOfLastDay() {
-  for (const std::size_t i : runner_->output().shownMeasures()) {
-    const auto leftOut = runner_->output().observationLeftOut(i);
-    if (!leftOut) continue;
-    state_.log.warning(fmt::format(
-        "End_Date = {} is the beginning of its day: the later observations of that day are left out (output "
-        "measure {}, {} ...). With a time of day, such as 23:59, they count",
-        formatDate(config_.period.end), quotedForMessage(config_.measures[i].name),
-        formatDate(dateOfSecond(*leftOut))));
-  }
-}
-
-/// Empty for a task that keeps no simulated values.
-std::vector<KeptSeries> RunDriver::keptSeries() const {
-  constexpr double kSecondsPerDay = 86400.0;
-  const bool isExact = config_.task && config_.task->keptPrecision() == SeriesPrecision::exact;  // units follow
-  const std::vector<std::size_t>& shown = runner_->output().shownMeasures();
-  std::vector<KeptSeries> kept;
-  std::size_t first = 0;
-  for (const ObservedSeries& observed : runner_->output().observedSeries()) {
-    if (std::find(shown.begin(), shown.end(), observed.measure) != shown.end()) {
-      KeptSeries& series = kept.emplace_back();
-      series.first = first;
-      const std::int64_t origin = secondNumber(observed.start);
-      for (const double days : observed.days) series.seconds.push_back(origin + std::llround(days * kSecondsPerDay));
-    }
-    first += observed.values.size() * (isExact ? 2 : 1);
-  }
-  return kept;
-}
-
-void RunDriver::openSeries() {
-  const std::string path = runFilePath(filePrefix_, run_files::kSeries);
-  const bool goesOn = results_->earlierEvaluations() != nullptr;
-  if (!goesOn) keepEarlierResults(std::array{path}, config_.setupFile, state_.log);
-  if (runner_->output().shownMeasures().empty()) return;
-  RecordedSeries run;
-  run.headLines = {
-      columnName(config_.title), fmt::format("Mirevo {}", programVersion()), "Setup file: " + config_.setupFile,
-      fmt::format("Evaluation period: {} to {}", formatDate(config_.period.start), formatDate(config_.period.end))};
-  const std::string task = config_.task ? std::string(config_.task->facts().name.name) : std::string();
-  run.task = task;
-  run.measures = seriesNames(config_.measures, runner_->output().shownMeasures());
-  run.observations = runner_->output().readShownObservations();
-  run.periodFirst = secondNumber(config_.period.start);
-  run.periodLast = secondNumber(config_.period.end);
-  run.largestGap = config_.period.largestGapDays();
-  warnOfLastDay();
-  run.initialValues = ToModelScale(parameters_->searchSpace(), parameters_->searchSpace().initial);
-  run.kept = keptSeries();
-  series_ = std::make_unique<SeriesRecorder>(path, std::move(run), runTimeClock,
-                                             [this](std::string_view text) { state_.log.warning(text); });
-  if (goesOn) {
-    std::string reason;
-    const auto earlier = readTextFile(path, reason);
-    std::error_code ignored;
-    if (!earlier && std::filesystem::exists(path, ignored)) {
-      state_.log.warning(fmt::format("The series of the earlier run are not taken up: {}: {}", path, reason));
-    }
-    const SeriesTable table = earlier ? readSeriesTable(*earlier) : SeriesTable{};
-    if (table.isOf(task)) {
-      if (const std::string remains = table.remains(); !remains.empty()) {
-        state_.log.warning(
-            fmt::format("{} is cut off or damaged: {}; the series of the earlier run have no values at other times",
-                        path, remains));
-      }
-      series_->resume(table);
-    } else {
-      keepEarlierFile(path, state_.log);  // of a run of another task in between
-    }
-  }
-  reporter_->recordSeries(*series_);
 }
 
 TaskContext RunDriver::taskContext() {

@@ -61,9 +61,6 @@ class RunDriver final {
   void logSetup();
   void openResults();
   void putEarlierReportAside();
-  std::vector<KeptSeries> keptSeries() const;
-  void warnOfLastDay();
-  void openSeries();
   /// Runs the task, if there is one, and writes its files.
   TaskOutcome runTask();
   void writeFiles(std::span<const TaskFile> files);
