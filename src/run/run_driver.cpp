@@ -29,6 +29,7 @@
 #include "run/job_end.h"
 #include "run/results/record_file.h"
 #include "run/results/shared_files.h"
+#include "run/run_findings.h"
 #include "run/run_model.h"
 #include "run/run_series.h"
 #include "run/setup/setup_reader.h"
@@ -336,28 +337,6 @@ std::vector<std::string> RunDriver::keepStatistics() {
   return report;
 }
 
-std::vector<std::string> RunDriver::closingLines(const Ending& ending) const {
-  std::vector<std::string> lines{ending.closingLine, "Ended: " + ending.time};
-  if (!reporter_) return lines;
-  const std::vector<std::string> differences = reporter_->differenceLines();
-  if (!reporter_->best()) {
-    lines.insert(lines.end(), differences.begin(), differences.end());
-    return lines;
-  }
-  const std::vector<std::string> scales = aggregator_->scaleLines();
-  lines.insert(lines.end(), scales.begin(), scales.end());
-  const BestEvaluation& best = *reporter_->best();
-  lines.push_back(fmt::format("Best evaluation: {}", best.number));
-  lines.push_back("Best aggregate: " + formatReal(best.aggregate));
-  const std::vector<std::string>& names = parameters_->searchSpace().names;
-  for (std::size_t i = 0; i < names.size(); ++i) {
-    lines.push_back(fmt::format("Best {} = {}", names[i], formatReal(best.parameterValues[i])));
-  }
-  for (const std::string& text : reporter_->differencesOfBest()) lines.push_back("Warning: " + text);
-  lines.insert(lines.end(), differences.begin(), differences.end());
-  return lines;
-}
-
 /// Adds to the record what is known at the end of the run.
 void RunDriver::completeRecord(const Ending& ending) {
   RunRecord& record = results_->record().record();
@@ -366,26 +345,14 @@ void RunDriver::completeRecord(const Ending& ending) {
   record.ended = ending.time;
   record.warningCount = state_.log.warningCount();
   record.warnings = state_.log.warnings();
-  if (!reporter_) return;
-  record.initialEvaluation = reporter_->initial();
-  if (const auto& best = reporter_->best()) record.best = ShownEvaluation{best->number, best->aggregate};
-  record.evaluations = reporter_->evaluationCount();
-  record.failed = reporter_->failedCount();
-  record.failuresByKind.clear();
-  for (const auto& [kind, count] : reporter_->failures().counts()) {
-    record.failuresByKind.emplace_back(failureKindKey(kind), count.count);
-  }
-  record.scales.clear();
-  if (aggregator_->scaleLines().empty()) return;  // there is no scale, or it is not known
-  for (std::size_t i = 0; i < config_.objectives.size(); ++i) {
-    record.scales.push_back({config_.objectives[i].name, aggregator_->sigma()[i], aggregator_->mu()[i]});
-  }
+  if (reporter_) addFindings(*reporter_, *aggregator_, config_.objectives, record);
 }
 
 std::optional<RunDriver::Unwritten> RunDriver::closeResults(const Ending& ending, std::span<const std::string> report) {
   if (reporter_) reporter_->settle(*aggregator_);
   if (series_) series_->finish(reporter_->best());
-  std::vector<std::string> lines = closingLines(ending);
+  std::vector<std::string> lines{ending.closingLine, "Ended: " + ending.time};
+  if (reporter_) addFindings(*reporter_, *aggregator_, parameters_->searchSpace().names, lines);
   lines.insert(lines.end(), report.begin(), report.end());
   const EndingSignalsHeld held;
   signalState.resultFileDescriptor = -1;

@@ -89,7 +89,6 @@ class RunDriver final {
   std::string warningCountText() const;
   std::string whereWarningsAre() const;
   void tellOfWarnings() const;
-  std::vector<std::string> closingLines(const Ending& ending) const;
 
   RunState state_;
   FileLock runLock_;      ///< on the files with the setup's name
