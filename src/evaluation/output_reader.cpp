@@ -17,6 +17,7 @@
 #include "common/files.h"
 #include "common/reading_watch.h"
 #include "common/text.h"
+#include "measures/dates.h"
 #include "measures/measure_file.h"
 #include "platform/processes/leaving_links.h"
 
@@ -39,14 +40,12 @@ ValueSummary summaryOf(const Values& values) {
 MeasurePairs pairsOf(std::size_t measure, const MeasureStatistics& statistics, const TimeSeriesObject& simulation,
                      const FileForm& file) {
   const std::int64_t start = secondNumber(simulation.startTime().value());
-  constexpr double kDaySeconds = 86400.0;
-  const auto second = [start](double days) { return start + std::llround(days * kDaySeconds); };
   const std::size_t count = statistics.simulatedValues.size();
   return {measure,
           count,
           statistics.observationCount - count,
-          second(statistics.times.front()),
-          second(statistics.times.back()),
+          secondAfter(start, statistics.times.front()),
+          secondAfter(start, statistics.times.back()),
           summaryOf(statistics.observedValues),
           summaryOf(statistics.simulatedValues),
           file};

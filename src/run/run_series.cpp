@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <array>
-#include <cmath>
 #include <cstdint>
 #include <filesystem>
 #include <string_view>
@@ -17,6 +16,7 @@
 #include "common/files.h"
 #include "common/text.h"
 #include "common/version.h"
+#include "measures/dates.h"
 #include "measures/period_series.h"
 #include "run/results/shared_files.h"
 
@@ -37,7 +37,6 @@ void warnOfLastDay(const RunConfig& config, OutputReader& output, RunLog& log) {
 
 /// Empty for a task that keeps no simulated values.
 std::vector<KeptSeries> keptSeries(const RunConfig& config, const OutputReader& output) {
-  constexpr double kSecondsPerDay = 86400.0;
   const bool isExact = config.task && config.task->keptPrecision() == SeriesPrecision::exact;  // units follow
   const std::vector<std::size_t>& shown = output.shownMeasures();
   std::vector<KeptSeries> kept;
@@ -47,7 +46,7 @@ std::vector<KeptSeries> keptSeries(const RunConfig& config, const OutputReader& 
       KeptSeries& series = kept.emplace_back();
       series.first = first;
       const std::int64_t origin = secondNumber(observed.start);
-      for (const double days : observed.days) series.seconds.push_back(origin + std::llround(days * kSecondsPerDay));
+      for (const double days : observed.days) series.seconds.push_back(secondAfter(origin, days));
     }
     first += observed.values.size() * (isExact ? 2 : 1);
   }
