@@ -7,16 +7,23 @@
 #include "common/progress_messages.h"
 
 namespace mirevo {
+namespace {
+
+std::string completedText(const EvaluationResult& result) {
+  std::string_view outcome = progress::kOk;
+  if (!result.ok()) {
+    // A set that cannot be run is no model run error, even if it is an equation that has no finite value.
+    outcome = result.failure->isOfConstraints() ? progress::kConstraintsViolated : progress::kModelRunError;
+  }
+  return progress::completedMessage(result.number, outcome);
+}
+
+}  // namespace
 
 void EvaluationLedger::begin(std::span<const ParameterSet> sets, DispatchMode mode) {
   sets_.assign(sets.begin(), sets.end());
   results_.assign(sets.size(), {});
   isFinished_.assign(sets.size(), false);
-  next_ = 0;
-  returned_.clear();
-  runAgain_.clear();
-  finishedCount_ = 0;
-  openCount_ = 0;
   isFinalRun_ = mode == DispatchMode::finalRun;
   if (earlier_ == nullptr || isFinalRun_) return;
   for (std::size_t place = 0; place < sets.size(); ++place) {
@@ -79,51 +86,51 @@ void EvaluationLedger::markInitiated(std::size_t place) {
 void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::string_view leftBehind) {
   result.number = numberOf(place);
   --openCount_;
-  if (!leftBehind.empty()) {
-    observer_.processesLeft(progress::nameOfEvaluation(result.number).append(": ").append(leftBehind));
-  }
-  warnOfUnusedObservations(result);
-  for (const std::string& text : result.warnings) {
-    observer_.warning(progress::nameOfEvaluation(result.number) + ": " + text);
-  }
-  for (const UnkeptFile& file : result.absentFiles) {
-    observer_.fileAbsent(file.name, progress::nameOfEvaluation(result.number) + ": " + file.reason);
-  }
-  std::string_view outcome = progress::kOk;
-  if (!result.ok()) {
-    // A set that cannot be run is no model run error, even if it is an equation that has no finite value.
-    outcome = result.failure->isOfConstraints() ? progress::kConstraintsViolated : progress::kModelRunError;
-  }
+  tellOfRun(result, leftBehind);
   if (runAgain_.erase(place) > 0) {
-    observer_.message(progress::completedMessage(result.number, outcome));
+    observer_.message(completedText(result));
     return finishAgain(place, result);
   }
+  noteUnkeptFiles(place, result);
+  if (auto known = earlier_ == nullptr ? std::nullopt : earlier_->take(result.number, sets_[place])) {
+    observer_.message(completedText(result));
+    return finishRepeated(place, std::move(*known), std::move(result));
+  }
+  ComparisonFindings found = runComparison_.take(result);
+  observer_.recordEvaluation(sets_[place], result);
+  observer_.message(completedText(result));
+  observer_.evaluationFinished(sets_[place], result);
+  tell(std::move(found));
+  store(place, std::move(result));
+}
+
+void EvaluationLedger::tellOfRun(const EvaluationResult& result, std::string_view leftBehind) {
+  const std::string front = progress::nameOfEvaluation(result.number) + ": ";
+  if (!leftBehind.empty()) observer_.processesLeft(std::string(front).append(leftBehind));
+  warnOfUnusedObservations(result);
+  for (const std::string& text : result.warnings) observer_.warning(front + text);
+  for (const UnkeptFile& file : result.absentFiles) observer_.fileAbsent(file.name, front + file.reason);
+}
+
+/// Of a run beside a row only if it is the run that the row describes.
+void EvaluationLedger::noteUnkeptFiles(std::size_t place, const EvaluationResult& result) {
   const std::vector<double> repeated = repeatedMeasures(place);
   const bool isNews = !result.unkeptFiles.empty() || (earlier_ != nullptr && earlier_->isRunAgain(result.number));
   if (result.ok() && isNews && (repeated.empty() || repeated == result.measureValues))
     observer_.recordUnkeptFiles(result.number, result.unkeptFiles);
-  std::optional<EvaluationResult> known;  // a repeated run has its row already, which is kept
-  if (earlier_ != nullptr) known = earlier_->take(result.number, sets_[place]);
-  ComparisonFindings found;
-  if (!known) {
-    found = runComparison_.take(result);
-    observer_.recordEvaluation(sets_[place], result);
+}
+
+/// Its model was run for its pairs, or as the final run, beside its row, which is kept.
+void EvaluationLedger::finishRepeated(std::size_t place, EvaluationResult known, EvaluationResult result) {
+  known.shownSeries = std::move(result.shownSeries);
+  if (result.ok()) known.pairs = std::move(result.pairs);
+  if (!result.ok() && known.ok()) {
+    observer_.warning(
+        fmt::format("{} was made again{}: the model run failed: {}", progress::nameOfEvaluation(result.number),
+                    isFinalRun_ ? "" : " for its pairs, and further runs are compared with the next successful one",
+                    result.failure->reason));
   }
-  observer_.message(progress::completedMessage(result.number, outcome));
-  if (known) {
-    known->shownSeries = std::move(result.shownSeries);
-    if (result.ok()) known->pairs = std::move(result.pairs);
-    if (!result.ok() && known->ok()) {
-      observer_.warning(
-          fmt::format("{} was made again{}: the model run failed: {}", progress::nameOfEvaluation(result.number),
-                      isFinalRun_ ? "" : " for its pairs, and further runs are compared with the next successful one",
-                      result.failure->reason));
-    }
-    return replay(place, std::move(*known));
-  }
-  observer_.evaluationFinished(sets_[place], result);
-  tell(std::move(found));
-  store(place, std::move(result));
+  replay(place, std::move(known));
 }
 
 /// Its result is known from an earlier run, whose output files could not all be kept.

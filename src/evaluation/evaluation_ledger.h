@@ -34,7 +34,7 @@ class EvaluationLedger final {
         equalMeasures_(std::move(equalMeasures)),
         runComparison_(std::move(runComparison)) {}
 
-  /// Opens the next batch of the run; `place` below is the 0-based index of a set in it.
+  /// Opens the next batch of the run, when none is open; `place` below is the 0-based index of a set in it.
   /// Sets that an earlier run has evaluated get their results at once, unless `mode` requires their model runs; the
   /// model is run for the output files of those that are EarlierEvaluations::isRunAgain(). Throws
   /// FatalError when the failed-run limit is exceeded, and if an earlier evaluation was of another set.
@@ -79,6 +79,9 @@ class EvaluationLedger final {
   void tell(ComparisonFindings found);
   void replay(std::size_t place, EvaluationResult result);
   void store(std::size_t place, EvaluationResult result);
+  void tellOfRun(const EvaluationResult& result, std::string_view leftBehind);
+  void noteUnkeptFiles(std::size_t place, const EvaluationResult& result);
+  void finishRepeated(std::size_t place, EvaluationResult known, EvaluationResult result);
   void finishAgain(std::size_t place, const EvaluationResult& result);
   std::vector<EvaluationResult> close();
 

@@ -95,12 +95,12 @@ struct EvaluationResult {
   /// If the task asks for them, the output measures in 64 bits, from all digits of the series; a number that the model
   /// wrote is the one of `measureValues`. Empty for a failed evaluation.
   std::vector<double> exactMeasures;
-  /// If the task asks for them, the simulated values at the observation times of ModelRunner::observedSeries(), one
+  /// If the task asks for them, the simulated values at the observation times of OutputReader::observedSeries(), one
   /// series after another, NaN where the model has none; exact ones with their units, see appendSimulatedValues().
   /// Empty for a failed evaluation, and once it has been reported if EvaluationObserver::readsSimulatedValues().
   std::vector<double> simulatedValues;
   /// For an evaluation that may be shown as the initial or the best one, its simulated series, one per measure of
-  /// ModelRunner::shownMeasures(). Empty for all others, and once the evaluation has been reported.
+  /// OutputReader::shownMeasures(). Empty for all others, and once the evaluation has been reported.
   std::vector<PeriodSeries> shownSeries;
   std::optional<EvaluationFailure> failure;
   std::vector<UnusedObservations> unusedObservations;

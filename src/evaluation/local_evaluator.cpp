@@ -14,7 +14,7 @@ LocalEvaluator::LocalEvaluator(ModelRunner& runner, EvaluationObserver& observer
                                int slotCount, EarlierEvaluations* earlier)
     : runner_(runner),
       observer_(observer),
-      ledger_(observer, failedRuns, earlier, runner.equalMeasures(), runner.runComparison()),
+      ledger_(observer, failedRuns, earlier, runner.equalMeasures(), runner.output().runComparison()),
       slots_(static_cast<std::size_t>(slotCount)) {
   assert(slotCount > 0);
 }

@@ -2,12 +2,10 @@
 
 #include <algorithm>
 #include <cerrno>
-#include <cmath>
 #include <cstring>
 #include <filesystem>
 #include <memory>
 #include <new>
-#include <numeric>
 #include <sys/stat.h>
 #include <unistd.h>
 #include <utility>
@@ -15,7 +13,6 @@
 
 #include <fmt/core.h>
 
-#include "common/calendar.h"
 #include "common/clock.h"
 #include "common/fatal_error.h"
 #include "common/file_copy.h"
@@ -24,7 +21,6 @@
 #include "common/reading_watch.h"
 #include "common/run_files.h"
 #include "common/text.h"
-#include "measures/measure_file.h"
 #include "parameters/read_template.h"
 #include "platform/processes/folder_room.h"
 #include "platform/processes/leaving_links.h"
@@ -80,29 +76,6 @@ std::string_view resistanceUpdateText(ResistanceUpdate outcome) {
   return {};
 }
 
-template <class Values>
-ValueSummary summaryOf(const Values& values) {
-  const auto [least, largest] = std::minmax_element(values.begin(), values.end());
-  const double sum = std::accumulate(values.begin(), values.end(), 0.0);
-  return {*least, sum / static_cast<double>(values.size()), *largest};
-}
-
-MeasurePairs pairsOf(std::size_t measure, const MeasureStatistics& statistics, const TimeSeriesObject& simulation,
-                     const FileForm& file) {
-  const std::int64_t start = secondNumber(simulation.startTime().value());
-  constexpr double kDaySeconds = 86400.0;
-  const auto second = [start](double days) { return start + std::llround(days * kDaySeconds); };
-  const std::size_t count = statistics.simulatedValues.size();
-  return {measure,
-          count,
-          statistics.observationCount - count,
-          second(statistics.times.front()),
-          second(statistics.times.back()),
-          summaryOf(statistics.observedValues),
-          summaryOf(statistics.simulatedValues),
-          file};
-}
-
 void removeFile(const std::string& path) {
   if (::unlink(path.c_str()) == 0 || errno == ENOENT || errno == ENOTDIR) return;
   fatalError("Error: Unable to remove " + path, std::strerror(errno));
@@ -125,23 +98,8 @@ ModelRunner::ModelRunner(ModelDescription description, ParameterModel& parameter
   settings.ownFiles = needs_.ownFiles();
   warnings_ = requireOwnFiles(description_.baseFolder, settings.ownFiles);
   readTemplates();
-  series_ = SeriesTables::MirevoTSobjectInit(description_.measures, description_.period, description_.isForRuns);
-  shownMeasures_ = measuresOfDistinctPairs(description_.measures);
-  for (const OutputMeasure& measure : description_.measures) {
-    if (measure.interfaceType != InterfaceType::measureFile) continue;
-    numbersNeeded_ = std::max(numbersNeeded_, static_cast<std::size_t>(measure.measurementNo));
-  }
-  if (std::error_code none; !description_.measureFile.empty()) {
-    const std::uintmax_t size = std::filesystem::file_size(trimTrailing(description_.measureFile), none);
-    if (!none) usualNumbers_ = size;
-  }
+  output_.emplace(description_, aggregator_);
   savedFiles_ = SavedFiles(description_.savedFiles, description_.baseFolder, description_.savedFolder);
-  for (std::size_t i = 0; i < description_.measures.size() && description_.keepSimulatedValues; ++i) {
-    const OutputMeasure& measure = description_.measures[i];
-    if (measure.interfaceType != InterfaceType::timeSeries) continue;
-    observedSeries_.push_back(
-        readObservedSeries(i, measure, description_.period, description_.keptPrecision, series_.observation(i)));
-  }
   if (settings.slotCount > 0 && !launcher_.initialise(settings)) {
     fatalError("Error: Unable to initialise MirevoSimpleLaunch", launcher_.lastError());
   }
@@ -156,8 +114,11 @@ ModelRunner::ModelRunner(ModelDescription description, ParameterModel& parameter
       files.parameterFiles.push_back(slotPath(item.paramFileName, slot));
     }
     writeConvertedTemplates(slot);
-    for (const std::string& name : series_.simulationFileNames()) files.simulationFiles.push_back(slotPath(name, slot));
-    if (!description_.measureFile.empty()) files.measureFile = slotPath(description_.measureFile, slot);
+    files.output.folder = launcher_.getProcessFolder(slot);
+    for (const std::string& name : output_->simulationFileNames()) {
+      files.output.simulationFiles.push_back(slotPath(name, slot));
+    }
+    if (!description_.measureFile.empty()) files.output.measureFile = slotPath(description_.measureFile, slot);
   }
 }
 
@@ -233,24 +194,13 @@ EqualMeasures ModelRunner::equalMeasures() const {
   }
   std::vector<std::string> names;
   std::vector<std::string> read;
-  for (MeasureSource& source :
-       measureSources(description_.measures, description_.measureFile, description_.baseFolder)) {
-    names.push_back(std::move(source.name));
-    read.push_back(std::move(source.fileName));
+  for (const MeasureSource& source : output_->sources()) {
+    names.push_back(source.name);
+    read.push_back(source.fileName);
   }
   return {parameters_.searchSpace(),
           parameterFields(parameters_, widestPlaceholders(templates_, parameters_.parameters().size())),
           std::move(names), std::move(written), std::move(read)};
-}
-
-RunComparison ModelRunner::runComparison() const {
-  PairRules rules;
-  for (std::size_t i = 0; i < description_.measures.size(); ++i) {
-    if (description_.measures[i].interfaceType != InterfaceType::timeSeries) continue;
-    rules.requiresShare = description_.minimumCoverage > 0.0;
-    rules.requiresProof = rules.requiresProof || !series_.needsPairs(i);
-  }
-  return {measureSources(description_.measures, description_.measureFile, description_.baseFolder), rules};
 }
 
 std::string ModelRunner::slotPath(const std::string& baseFile, int slot) const {
@@ -301,8 +251,8 @@ std::optional<EvaluationFailure> ModelRunner::prepareModelRun(std::span<const do
   SlotFiles& files = slots_.at(static_cast<std::size_t>(slot - 1));
   files.isUsed = true;
   // Files of an earlier run must never be taken for results of this one.
-  for (const std::string& path : files.simulationFiles) removeFile(path);
-  if (!files.measureFile.empty()) removeFile(files.measureFile);
+  for (const std::string& path : files.output.simulationFiles) removeFile(path);
+  if (!files.output.measureFile.empty()) removeFile(files.output.measureFile);
   savedFiles_.markAsOld(launcher_.getProcessFolder(slot));
   for (std::size_t i = 0; i < templates_.size(); ++i) {
     const std::string& path = files.parameterFiles[i];
@@ -331,13 +281,13 @@ EvaluationResult ModelRunner::collect(int slot, std::function<void()> look) {
     readingSeconds_ += seconds;
     launcher_.excludeTime(seconds);
   };
-  const std::unique_ptr<ReadingWatch, decltype(endReading)> reading(&series_.watch(), endReading);
+  const std::unique_ptr<ReadingWatch, decltype(endReading)> reading(&output_->watch(), endReading);
   try {
     return read(slot);
   } catch (const std::bad_alloc&) {
-    series_.releaseSimulationFiles();
-    return failedResult(makeFailure(Kind::resultsNotReadable,
-                                    "reading the files of the model run takes more memory than there is", slot));
+    output_->release();
+    return failedResult({Kind::resultsNotReadable, "reading the files of the model run takes more memory than there is",
+                         launcher_.lastOutput(slot, kEvidenceLines)});
   }
 }
 
@@ -352,88 +302,27 @@ void ModelRunner::beginReading(int slot, std::function<void()> look) {
     seconds = std::max(maxSeconds_ - used, kLeastSeconds);
     limit = fmt::format("the model run had left of its {:g} seconds", maxSeconds_);
   }
-  series_.watch().begin(seconds, std::move(limit), std::move(look));
+  output_->watch().begin(seconds, std::move(limit), std::move(look));
 }
 
 EvaluationResult ModelRunner::read(int slot) {
-  EvaluationResult result = judge(slot);
+  auto failure = findBatchFailure(slot);
+  EvaluationResult result =
+      failure ? failedResult(std::move(*failure)) : output_->read(slots_.at(static_cast<std::size_t>(slot - 1)).output);
+  const bool mayBeCutOff = result.ok() && output_->mayBeCutOff(result);
+  if (!result.ok()) result.failure->lastOutput = launcher_.lastOutput(slot, kEvidenceLines);
+  if (mayBeCutOff) result.lastOutput = launcher_.lastOutput(slot, kEvidenceLines);
   for (std::string& line : sharedTargets_.takeChanged()) result.warnings.push_back(std::move(line));
   for (std::string& line : sharedTargets_.takeHardLinked(launcher_.getProcessFolder(slot), needs_.outputs)) {
     result.warnings.push_back(std::move(line));
   }
   for (std::string& line : launcher_.takeWarnings()) result.warnings.push_back(std::move(line));
   // A result that may turn out to be cut off must not keep others from being shown.
-  if (result.ok() && (mayBeCutOff(result) || shownRuns_.mayBeShown(slot, result.aggregate))) {
-    for (const std::size_t i : shownMeasures_) {
-      result.shownSeries.push_back(
-          readPeriodSeries(series_.simulation(i), description_.measures[i].simulation, description_.period));
-    }
+  if (result.ok() && (mayBeCutOff || shownRuns_.mayBeShown(slot, result.aggregate))) {
+    result.shownSeries = output_->readShownSeries();
   }
-  series_.releaseSimulationFiles();
+  output_->release();
   return result;
-}
-
-std::optional<std::int64_t> ModelRunner::observationLeftOut(std::size_t measure) {
-  constexpr std::int64_t kSecondsOfDay = 86400;
-  EvaluationPeriod rest{description_.period.end, description_.period.end};
-  const std::int64_t end = secondNumber(rest.start);
-  if (end % kSecondsOfDay != 0) return std::nullopt;
-  rest.end = dateOfSecond(end + kSecondsOfDay - 1);
-  const PeriodSeries series =
-      readPeriodSeries(series_.observation(measure), description_.measures[measure].observation, rest);
-  for (std::size_t i = 0; i < series.seconds.size(); ++i) {
-    const bool isOfDay = series.seconds[i] > end && series.seconds[i] < end + kSecondsOfDay;
-    if (isOfDay && !std::isnan(series.values[i])) return series.seconds[i];
-  }
-  return std::nullopt;
-}
-
-std::vector<PeriodSeries> ModelRunner::readShownObservations() {
-  std::vector<PeriodSeries> observations;
-  for (const std::size_t i : shownMeasures_) {
-    observations.push_back(
-        readPeriodSeries(series_.observation(i), description_.measures[i].observation, description_.period));
-  }
-  return observations;
-}
-
-EvaluationResult ModelRunner::judge(int slot) {
-  EvaluationResult result;
-  result.measureValues.assign(description_.measures.size(), std::nan(""));
-  if (description_.computeExactMeasures) result.exactMeasures = result.measureValues;
-  auto failure = findBatchFailure(slot);
-  if (!failure) failure = findMissingResults(slot);
-  if (!failure) failure = readMeasures(slot, result);
-  if (failure) return failedResult(std::move(*failure));
-
-  const auto isFinite = [](double value) { return std::isfinite(value); };
-  const auto measure = std::find_if_not(result.measureValues.begin(), result.measureValues.end(), isFinite);
-  if (measure != result.measureValues.end()) {
-    const auto i = static_cast<std::size_t>(measure - result.measureValues.begin());
-    return failedResult(makeFailure(
-        Kind::resultNotFinite,
-        fmt::format("output measure \"{}\" is {}", trimTrailing(description_.measures[i].name), formatReal(*measure)),
-        slot));
-  }
-  result.objectiveValues = objectiveFunctionValues(description_.objectives, result.measureValues);
-  const auto objective = std::find_if_not(result.objectiveValues.begin(), result.objectiveValues.end(), isFinite);
-  if (objective != result.objectiveValues.end()) {
-    const auto i = static_cast<std::size_t>(objective - result.objectiveValues.begin());
-    return failedResult(makeFailure(Kind::resultNotFinite,
-                                    fmt::format("objective function \"{}\" is {}",
-                                                trimTrailing(description_.objectives[i].name), formatReal(*objective)),
-                                    slot));
-  }
-  result.aggregate = aggregator_.aggregate(result.objectiveValues);
-  if (mayBeCutOff(result)) result.lastOutput = launcher_.lastOutput(slot, kEvidenceLines);
-  return result;
-}
-
-bool ModelRunner::mayBeCutOff(const EvaluationResult& result) const {
-  return std::any_of(result.pairs.begin(), result.pairs.end(), [this](const MeasurePairs& pairs) {
-    const std::vector<std::size_t>& endless = standard_.withoutLineEnds;
-    return !pairs.file.endsLine && std::find(endless.begin(), endless.end(), pairs.measure) == endless.end();
-  });
 }
 
 void ModelRunner::keepOutputFiles(int slot, int number, EvaluationResult& result,
@@ -473,161 +362,10 @@ void ModelRunner::keepFailedFolder(int slot, int number, std::vector<std::string
   warnings.push_back(fmt::format("The folder of this run was not kept as {}: {}", kept, reason));
 }
 
-EvaluationResult ModelRunner::failedResult(EvaluationFailure failure) const {
-  EvaluationResult result;
-  result.measureValues.assign(description_.measures.size(), kFailedRunValue);
-  result.objectiveValues.assign(description_.objectives.size(), kFailedRunValue);
-  result.failure = std::move(failure);
-  return result;
-}
-
-EvaluationFailure ModelRunner::makeFailure(Kind kind, std::string reason, int slot) const {
-  return {kind, std::move(reason), launcher_.lastOutput(slot, kEvidenceLines)};
-}
-
 std::optional<EvaluationFailure> ModelRunner::findBatchFailure(int slot) const {
   BatchFailure failure = launcher_.failure(slot);
   if (failure.kind == BatchFailure::Kind::none) return std::nullopt;
-  return makeFailure(failureKind(failure.kind), std::move(failure.detail), slot);
-}
-
-std::optional<EvaluationFailure> ModelRunner::findMissingResults(int slot) const {
-  const SlotFiles& files = slots_.at(static_cast<std::size_t>(slot - 1));
-  std::vector<std::string> wanted = files.simulationFiles;
-  if (!files.measureFile.empty()) wanted.push_back(files.measureFile);
-  for (const std::string& path : wanted) {
-    struct stat status {};
-    if (::stat(path.c_str(), &status) == 0) {
-      const std::string folder = launcher_.getProcessFolder(slot);
-      const auto link = findLeavingLink(folder, std::string_view(path).substr(folder.size()));
-      if (!link) continue;
-      return makeFailure(Kind::resultsNotReadable, fmt::format("{}: {}", path, describe(*link)), slot);
-    }
-    if (errno == ENOENT || errno == ENOTDIR) {
-      return makeFailure(Kind::resultsNotWritten, "the batch ended well but did not write " + path, slot);
-    }
-    return makeFailure(Kind::resultsNotReadable, fmt::format("{}: {}", path, std::strerror(errno)), slot);
-  }
-  return std::nullopt;
-}
-
-std::optional<EvaluationFailure> ModelRunner::readMeasures(int slot, EvaluationResult& result) {
-  const SlotFiles& files = slots_.at(static_cast<std::size_t>(slot - 1));
-  MeasureFile written;
-  if (!files.measureFile.empty()) {
-    std::string reason;
-    std::optional<MeasureFile> file;
-    if (const std::string tooLarge = faultOfSize(files.measureFile, usualNumbers_); !tooLarge.empty()) {
-      reason = fmt::format("{}: {}", files.measureFile, tooLarge);
-    } else {
-      file = readMeasureFile(files.measureFile, numbersNeeded_, reason, series_.watch());
-    }
-    if (!file) return makeFailure(Kind::resultsNotReadable, std::move(reason), slot);
-    written = std::move(*file);
-  }
-  if (auto unusable = series_.tryOpenSimulationFiles(files.simulationFiles)) {
-    return makeFailure(Kind::resultsNotReadable, std::move(*unusable), slot);
-  }
-  std::optional<EvaluationFailure> failure;
-  std::vector<std::optional<FileForm>> forms(files.simulationFiles.size());
-  bool hasForm = false;  // of the output-measure file
-  for (std::size_t i = 0; i < result.measureValues.size() && !failure; ++i) {
-    const OutputMeasure& measure = description_.measures[i];
-    if (measure.interfaceType != InterfaceType::measureFile) {
-      std::optional<FileForm>& form = forms.at(series_.simulationIndex(i));
-      if (!form) form = formOfSeries(series_.simulation(i), description_.period);
-      failure = readSeriesMeasure(slot, i, *form, result);
-      continue;
-    }
-    if (!std::exchange(hasForm, true)) {
-      MeasurePairs& first = result.pairs.emplace_back();
-      first.measure = i;
-      first.file.endsLine = written.endsLine;
-      first.file.numberCount = written.numbers.size();
-    }
-    const auto number = static_cast<std::size_t>(measure.measurementNo);
-    if (number <= written.numbers.size()) {
-      result.measureValues[i] = written.numbers[number - 1];
-      if (description_.computeExactMeasures) result.exactMeasures[i] = written.numbers[number - 1];
-    } else {
-      failure = makeFailure(
-          Kind::resultsNotReadable,
-          fmt::format("{}: expected at least {} numbers, found {}", files.measureFile, number, written.numbers.size()),
-          slot);
-    }
-  }
-  for (const ObservedSeries& observed : observedSeries_) {
-    if (failure) break;
-    appendSimulatedValues(observed, description_.measures[observed.measure], description_.keptPrecision,
-                          description_.period.largestGapDays(), series_.simulation(observed.measure),
-                          result.simulatedValues);
-  }
-  return failure;
-}
-
-std::optional<EvaluationFailure> ModelRunner::readSeriesMeasure(int slot, std::size_t i, const FileForm& form,
-                                                                EvaluationResult& result) {
-  const OutputMeasure& measure = description_.measures[i];
-  const std::string path = slotPath(measure.simulation.fileName, slot);
-  TimeSeriesObject& simulation = series_.simulation(i);
-  if (measure.simulation.itemNo > simulation.itemCount()) {
-    return makeFailure(Kind::resultsNotReadable,
-                       fmt::format("{}: expected item No. {}, found {} items", path, measure.simulation.itemNo,
-                                   simulation.itemCount()),
-                       slot);
-  }
-  try {
-    // A model that stopped early is a failed evaluation; a setup whose period no model run can match ends the run.
-    const bool canHavePairs = series_.needsPairs(i) || standard_.anyHasSucceeded;
-    if (canHavePairs && !hasPairs(measure, description_.period, simulation, series_.observation(i))) {
-      return makeFailure(Kind::resultsNotWritten,
-                         fmt::format("{}: item No. {} ({}) has no value at any observation time in the evaluation "
-                                     "period",
-                                     path, measure.simulation.itemNo, simulation.itemName(measure.simulation.itemNo)),
-                         slot);
-    }
-    const MeasureStatistics statistics =
-        computeMeasureStatistics(measure, description_.period, simulation, series_.observation(i));
-    result.measureValues[i] = selectStatistic(statistics, measure.statisticType);
-    if (description_.computeExactMeasures) {
-      result.exactMeasures[i] =
-          measureValue(measure, description_.period, simulation, series_.observation(i), SeriesPrecision::exact);
-    }
-    noteUnusedObservations(i, statistics, result);
-    result.pairs.push_back(pairsOf(i, statistics, simulation, form));
-    return findLackOfPairs(i, statistics.simulatedValues.size(), slot);
-  } catch (const FatalError& error) {  // the message names the file as in the setup
-    fatalError(error.message(), error.detail() + "\nread from " + path);
-  }
-}
-
-std::optional<EvaluationFailure> ModelRunner::findLackOfPairs(std::size_t i, std::size_t count, int slot) const {
-  if (standard_.firstCounts.empty()) return std::nullopt;
-  const std::size_t ofFirst = standard_.firstCounts.at(i);
-  // A quotient is rounded to the number that the setup gives, a product need not be: 3 of 30 pairs are 0.1.
-  if (ofFirst == 0 || static_cast<double>(count) / static_cast<double>(ofFirst) >= description_.minimumCoverage) {
-    return std::nullopt;
-  }
-  return makeFailure(Kind::tooFewPairs,
-                     fmt::format("output measure \"{}\" has {} pairs of simulated and observed values, {} in the "
-                                 "first successful run, No. {}: a share below Minimum_Coverage = {}",
-                                 trimTrailing(description_.measures[i].name), count, ofFirst, standard_.firstNumber,
-                                 formatReal(description_.minimumCoverage)),
-                     slot);
-}
-
-void ModelRunner::noteUnusedObservations(std::size_t i, const MeasureStatistics& statistics,
-                                         EvaluationResult& result) const {
-  if (!statistics.firstUnused) return;
-  const std::size_t pairs = statistics.simulatedValues.size();
-  const OutputMeasure& measure = description_.measures[i];
-  result.unusedObservations.push_back(
-      {i, pairs,
-       fmt::format(
-           "output measure \"{}\": {} of {} observations in the evaluation period are not used, as item No. {} of "
-           "{} has no value at their time; the first is at {}",
-           trimTrailing(measure.name), statistics.observationCount - pairs, statistics.observationCount,
-           measure.simulation.itemNo, trimTrailing(measure.simulation.fileName), formatDate(*statistics.firstUnused))});
+  return EvaluationFailure{failureKind(failure.kind), std::move(failure.detail), {}};
 }
 
 }  // namespace mirevo

@@ -11,40 +11,16 @@
 #include "evaluation/equal_measures.h"
 #include "evaluation/evaluation_result.h"
 #include "evaluation/folder_damage.h"
-#include "evaluation/run_comparison.h"
+#include "evaluation/model_description.h"
+#include "evaluation/output_reader.h"
 #include "evaluation/saved_files.h"
 #include "evaluation/shown_runs.h"
-#include "measures/measure_statistics.h"
-#include "measures/objective_functions.h"
-#include "measures/observed_series.h"
-#include "measures/output_measure.h"
-#include "measures/series_tables.h"
 #include "parameters/parameter_model.h"
 #include "parameters/template_file.h"
 #include "platform/processes/process_launcher.h"
 #include "platform/processes/shared_targets.h"
 
 namespace mirevo {
-
-/// All that is needed to turn a parameter set into a result, except the parameters themselves. File names are absolute.
-struct ModelDescription {
-  std::string baseFolder;
-  std::string fileTag;  ///< name of the setup; part of the names of converted templates in process folders
-  std::vector<ParameterFileItem> parameterFiles;
-  std::vector<OutputMeasure> measures;
-  std::string measureFile;  ///< output-measure file; empty when no measure is of interface type 1
-  EvaluationPeriod period;
-  double minimumCoverage = 0.0;  ///< share of the first successful run's pairs below which a run fails
-  std::vector<ObjectiveFunction> objectives;
-  std::vector<std::string> savedFiles;  ///< files kept from every model run
-  std::string savedFolder;              ///< where they are kept
-  std::string failedFolderPrefix;       ///< path of a failed run's folder, without the evaluation number that follows
-  int runsAtOnce = 1;                 ///< model runs side by side, of all ranks, whose room on the disk is left to them
-  bool isForRuns = true;              ///< model runs follow
-  bool computeExactMeasures = false;  ///< results hold the measures in 64 bits, too
-  bool keepSimulatedValues = false;   ///< results hold the simulated values at the observation times
-  SeriesPrecision keptPrecision = SeriesPrecision::single;
-};
 
 /// Model runs in slots: writes the input, starts the batch, and turns its output into a result. Used by the local loop
 /// and by an MPI worker (which has slot 1 only).
@@ -55,12 +31,14 @@ class ModelRunner final {
   /// used. Throws FatalError.
   ModelRunner(ModelDescription description, ParameterModel& parameters, ObjectiveAggregator& aggregator,
               ProcessLauncher& launcher, const LauncherSettings& launcherSettings);
+  ModelRunner(const ModelRunner&) = delete;  // the reader refers to the description
+  ModelRunner& operator=(const ModelRunner&) = delete;
 
   /// Why the set cannot be run; empty if it can.
   std::optional<EvaluationFailure> findUnrunnable(std::span<const double> set);
 
-  /// From now on a model run with less than the least share of its pairs is a failed evaluation.
-  void setStandard(RunStandard standard) { standard_ = std::move(standard); }
+  /// By what further model runs are judged.
+  void setStandard(RunStandard standard) { output_->setStandard(std::move(standard)); }
 
   /// To be called before a model run in the slot: if the run before it has damaged the process folder, makes that anew,
   /// with a line in `warnings`. Returns why the slot cannot be used any more: this failed, or the run in the folder
@@ -88,37 +66,26 @@ class ModelRunner final {
   void keepFailedFolder(int slot, int number, std::vector<std::string>& warnings) const;
 
   /// A result with the failed-run value in every field.
-  EvaluationResult failedResult(EvaluationFailure failure) const;
+  EvaluationResult failedResult(EvaluationFailure failure) const { return output_->failedResult(std::move(failure)); }
 
   ObjectiveAggregator& aggregator() { return aggregator_; }
   ProcessLauncher& launcher() { return launcher_; }
-  /// The observations of every measure of interface type 0; empty unless simulated values are kept.
-  const std::vector<ObservedSeries>& observedSeries() const { return observedSeries_; }
-  /// The measures whose simulated series a result may hold, 0-based: one per pair of series that is compared.
-  const std::vector<std::size_t>& shownMeasures() const { return shownMeasures_; }
-  /// The first observation, of the series of a measure, behind the end of the period on the same day if that end is the
-  /// beginning of the day; its secondNumber().
-  std::optional<std::int64_t> observationLeftOut(std::size_t measure);
-  /// The observed series of each of shownMeasures().
-  std::vector<PeriodSeries> readShownObservations();
+  /// What is read of model runs and observations.
+  OutputReader& output() { return *output_; }
   const std::vector<ParameterTemplate>& templates() const { return templates_; }
   /// A check for a model that ignores its parameters, for the evaluations of a run.
   EqualMeasures equalMeasures() const;
-  /// A comparison of model runs with the first successful one, for the evaluations of a run.
-  RunComparison runComparison() const;
   /// What the user should know of links in the model's folder, and templateDoubts() of all templates.
   const std::vector<std::string>& warnings() const { return warnings_; }
-  const std::vector<std::string>& seriesWarnings() const { return series_.warnings(); }
 
  private:
   /// Paths of one slot's copies of the model's files.
   struct SlotFiles {
-    std::vector<std::string> parameterFiles;   ///< in the order of ModelDescription::parameterFiles
-    std::vector<std::string> simulationFiles;  ///< in the order of SeriesTables::simulationFileNames()
-    std::string measureFile;                   ///< empty when there is none
-    bool isUsed = false;                       ///< a model has run in the folder
-    bool isRenewed = false;                    ///< it was made anew, and no run has left it whole since
-    double started = 0.0;                      ///< when the model run was, by runTimeClock() - readingSeconds_
+    std::vector<std::string> parameterFiles;  ///< in the order of ModelDescription::parameterFiles
+    OutputFiles output;
+    bool isUsed = false;     ///< a model has run in the folder
+    bool isRenewed = false;  ///< it was made anew, and no run has left it whole since
+    double started = 0.0;    ///< when the model run was, by runTimeClock() - readingSeconds_
   };
 
   FolderNeeds folderNeeds(const LauncherSettings& settings) const;
@@ -132,20 +99,8 @@ class ModelRunner final {
   std::string slotPath(const std::string& baseFile, int slot) const;
   void updateResistanceNumbers(const std::string& path);
   EvaluationResult read(int slot);
-  EvaluationResult judge(int slot);
   void beginReading(int slot, std::function<void()> look);
   std::optional<EvaluationFailure> findBatchFailure(int slot) const;
-  std::optional<EvaluationFailure> findMissingResults(int slot) const;
-  /// Fills in the measures and simulated values and leaves the series open; returns a failure if the model's output
-  /// cannot be used.
-  std::optional<EvaluationFailure> readMeasures(int slot, EvaluationResult& result);
-  std::optional<EvaluationFailure> readSeriesMeasure(int slot, std::size_t measure, const FileForm& form,
-                                                     EvaluationResult& result);
-  /// Whether the first successful run may show that the result is no whole one, see RunComparison::judge().
-  bool mayBeCutOff(const EvaluationResult& result) const;
-  std::optional<EvaluationFailure> findLackOfPairs(std::size_t measure, std::size_t count, int slot) const;
-  void noteUnusedObservations(std::size_t measure, const MeasureStatistics& statistics, EvaluationResult& result) const;
-  EvaluationFailure makeFailure(EvaluationFailure::Kind kind, std::string reason, int slot) const;
 
   ModelDescription description_;
   ParameterModel& parameters_;
@@ -156,17 +111,12 @@ class ModelRunner final {
   std::vector<ParameterTemplate> templates_;  ///< one per parameter file
   std::vector<std::string> convertedTexts_;   ///< one per parameter file: that of a converted numeric-ID template
   std::vector<std::string> warnings_;
-  SeriesTables series_;
-  std::size_t numbersNeeded_ = 0;    ///< in the output-measure file
-  std::uintmax_t usualNumbers_ = 0;  ///< size of that file as it was found at the start
-  double maxSeconds_ = 0.0;          ///< of a model run; 0: no limit
-  double readingSeconds_ = 0.0;      ///< that the results of model runs have taken so far
+  std::optional<OutputReader> output_;  ///< once the templates have been read
+  double maxSeconds_ = 0.0;             ///< of a model run; 0: no limit
+  double readingSeconds_ = 0.0;         ///< that the results of model runs have taken so far
   SavedFiles savedFiles_;
   SharedTargets sharedTargets_;  ///< looked at again after the first model run
-  std::vector<ObservedSeries> observedSeries_;
-  std::vector<std::size_t> shownMeasures_;
   ShownRuns shownRuns_;
-  RunStandard standard_;
   std::vector<SlotFiles> slots_;
 };
 

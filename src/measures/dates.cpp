@@ -61,7 +61,7 @@ double daysSince(const DateRecord& origin, const DateRecord& date) {
   int status = 0;
   const double hours = DBTIMDIF(status, date, origin, kDateFieldCount);
   const double seconds = static_cast<double>(date[kSecond]) - static_cast<double>(origin[kSecond]);
-  return hours / 24.0 + seconds / 86400.0;
+  return hours / 24.0 + seconds / kSecondsPerDay;
 }
 
 }  // namespace mirevo

@@ -1,5 +1,8 @@
 #pragma once
 
+#include <cmath>
+#include <cstdint>
+
 #include "common/date_record.h"
 
 namespace mirevo {
@@ -14,5 +17,12 @@ double DBTIMDIF(int& status, const DateRecord& dateA, const DateRecord& dateB, i
 
 /// Days from `origin` to `date`, including the seconds of both.
 double daysSince(const DateRecord& origin, const DateRecord& date);
+
+inline constexpr double kSecondsPerDay = 86400.0;
+
+/// The nearest second so many days after `origin`; both are a secondNumber().
+inline std::int64_t secondAfter(std::int64_t origin, double days) {
+  return origin + std::llround(days * kSecondsPerDay);
+}
 
 }  // namespace mirevo

@@ -1,7 +1,6 @@
 #include "measures/file_form.h"
 
 #include <algorithm>
-#include <cmath>
 #include <span>
 
 #include "common/calendar.h"
@@ -32,10 +31,9 @@ FileForm formOfSeries(const TimeSeriesObject& series, const EvaluationPeriod& pe
     widest = step + 1;
   }
   if (widest == to) return form;
-  constexpr double kSecondsPerDay = 86400.0;
   const std::int64_t origin = secondNumber(*start);
-  form.gapStart = origin + std::llround(widest[-1] * kSecondsPerDay);
-  form.gapEnd = origin + std::llround(*widest * kSecondsPerDay);
+  form.gapStart = secondAfter(origin, widest[-1]);
+  form.gapEnd = secondAfter(origin, *widest);
   return form;
 }
 

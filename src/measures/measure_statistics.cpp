@@ -138,10 +138,7 @@ MeasureStatistics collectPairs(const SeriesItem& simulation, const SeriesItem& o
                            formatDate(period.start), formatDate(period.end), describeSpan(simulation),
                            describeSpan(observation)));
   }
-  if (firstUnused) {
-    constexpr double kDaySeconds = 86400.0;
-    statistics.firstUnused = dateOfSecond(secondNumber(simulation.start) + std::llround(*firstUnused * kDaySeconds));
-  }
+  if (firstUnused) statistics.firstUnused = dateOfSecond(secondAfter(secondNumber(simulation.start), *firstUnused));
   return statistics;
 }
 

@@ -31,8 +31,8 @@ double usualMarkerAmong(std::span<const double> values);
 std::size_t simulatedValueCount(std::span<const ObservedSeries> observed, SeriesPrecision precision);
 
 /// Appends the simulated value at each observation time to `values`, NaN where there is none, as between steps farther
-/// apart than `largestGap` (days). If exact, the unit in
-/// which the file gives each of them follows (interpolated as the values are), NaN where there is none.
+/// apart than `largestGap` (days). If exact, the unit in which the file gives each of them follows (interpolated as the
+/// values are), NaN where there is none.
 void appendSimulatedValues(const ObservedSeries& observed, const OutputMeasure& measure, SeriesPrecision precision,
                            double largestGap, TimeSeriesObject& simulation, std::vector<double>& values);
 

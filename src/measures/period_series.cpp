@@ -1,19 +1,14 @@
 #include "measures/period_series.h"
 
 #include <algorithm>
-#include <cmath>
 #include <limits>
 #include <optional>
 
 #include "common/calendar.h"
+#include "measures/dates.h"
 #include "measures/measure_statistics.h"
 
 namespace mirevo {
-namespace {
-
-constexpr double kSecondsPerDay = 86400.0;
-
-}  // namespace
 
 PeriodSeries readPeriodSeries(TimeSeriesObject& series, const SeriesReference& reference,
                               const EvaluationPeriod& period) {
@@ -33,7 +28,7 @@ PeriodSeries readPeriodSeries(TimeSeriesObject& series, const SeriesReference& r
   if (last != times.end()) ++last;
   const std::optional<float> deleteValue = series.deleteValue();
   for (auto time = first; time != last; ++time) {
-    const std::int64_t second = origin + std::llround(*time * kSecondsPerDay);
+    const std::int64_t second = secondAfter(origin, *time);
     if (!read.seconds.empty() && second <= read.seconds.back()) continue;  // a step of less than a second
     const float value = values[static_cast<std::size_t>(time - times.begin())];
     read.seconds.push_back(second);

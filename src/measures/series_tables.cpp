@@ -198,12 +198,6 @@ void SeriesTables::warnOfMarkers(const ObservedSeries& observed, const OutputMea
   if (!isKnown) warnings_.push_back(std::move(warning));
 }
 
-void SeriesTables::openSimulationFiles(std::span<const std::string> paths) {
-  assert(paths.size() == simulationNames_.size());
-  releaseSimulationFiles();
-  for (const std::string& path : paths) simulations_.push_back(openTimeSeries(path, {}, reading_));
-}
-
 std::optional<std::string> SeriesTables::tryOpenSimulationFiles(std::span<const std::string> paths) {
   assert(paths.size() == simulationNames_.size());
   releaseSimulationFiles();

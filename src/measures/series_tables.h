@@ -29,13 +29,11 @@ class SeriesTables final {
                                          bool isForRuns = true);
 
   /// Opens the simulation files of one evaluation: `paths[i]` is the copy of simulationFileNames()[i] in the slot's
-  /// folder. Files still open are released first. Throws FatalError as openTimeSeries() does.
-  void openSimulationFiles(std::span<const std::string> paths);
-  /// The same for results that a model run may have left unusable. Returns one line for a person, with all files
-  /// released, when a file cannot be opened or has no time step, or when an item in use cannot be read or has missing
-  /// values only, when the time of watch() is over, and when a file takes too much memory or is far larger than the one
-  /// that was found at the start; empty when the files are open. An item number that a file does not have is left to
-  /// the measures, which end the run.
+  /// folder. Files still open are released first. Returns one line for a person, with all files released, when a file
+  /// cannot be opened or has no time step, when an item in use cannot be read or has missing values only, when the time
+  /// of watch() is over, and when a file takes too much memory or is far larger than the one that was found at the
+  /// start; empty when the files are open. An item number that a file does not have is left to the measures, which end
+  /// the run.
   std::optional<std::string> tryOpenSimulationFiles(std::span<const std::string> paths);
   void releaseSimulationFiles();
   /// Limits how long files are read.

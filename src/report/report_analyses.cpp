@@ -19,6 +19,7 @@
 #include "common/take_text.h"
 #include "common/text.h"
 #include "evaluation/stored_results.h"
+#include "measures/dates.h"
 #include "measures/period_series.h"
 #include "parameters/parameter_fields.h"
 #include "parameters/parameter_model.h"
@@ -92,8 +93,7 @@ std::optional<ReportedBand> readBand(const std::string& path, std::optional<int>
   }
   ReportedBand band;
   const std::int64_t origin = secondNumber(*file->startTime());
-  constexpr double kSecondsPerDay = 86400.0;
-  for (const double days : file->times()) band.seconds.push_back(origin + std::llround(days * kSecondsPerDay));
+  for (const double days : file->times()) band.seconds.push_back(secondAfter(origin, days));
   const auto column = [&file](int item) {
     const std::span<const float> values = file->values(item);
     return std::vector<float>(values.begin(), values.end());

@@ -1,9 +1,7 @@
 #include "run/run_driver.h"
 
 #include <algorithm>
-#include <array>
 #include <cerrno>
-#include <cmath>
 #include <cstring>
 #include <filesystem>
 #include <new>
@@ -12,7 +10,6 @@
 
 #include <fmt/core.h>
 
-#include "common/calendar.h"
 #include "common/clock.h"
 #include "common/fatal_error.h"
 #include "common/file_lock.h"
@@ -24,7 +21,6 @@
 #include "common/version.h"
 #include "evaluation/local_evaluator.h"
 #include "evaluation/ranks/rank_evaluator.h"
-#include "measures/period_series.h"
 #include "platform/processes/posix_process_launcher.h"
 #include "platform/processes/process_folder.h"
 #include "platform/signals/signal_state.h"
@@ -33,7 +29,9 @@
 #include "run/job_end.h"
 #include "run/results/record_file.h"
 #include "run/results/shared_files.h"
+#include "run/run_findings.h"
 #include "run/run_model.h"
+#include "run/run_series.h"
 #include "run/setup/setup_reader.h"
 #include "run/setup/setup_summary.h"
 #include "run/setup/setup_warnings.h"
@@ -214,7 +212,7 @@ void RunDriver::logSetup() {
     for (const std::string& text : config_.task->warnings(parameters_->searchSpace())) state_.log.warning(text);
   }
   for (const std::string& text : runner_->warnings()) state_.log.warning(text);
-  for (const std::string& text : runner_->seriesWarnings()) state_.log.warning(text);
+  for (const std::string& text : runner_->output().warnings()) state_.log.warning(text);
   for (const std::string& text :
        unusedParameterWarnings(config_.parameters, config_.constraints, runner_->templates())) {
     state_.log.warning(text);
@@ -234,16 +232,17 @@ void RunDriver::logSetup() {
 void RunDriver::openResults() {
   hasBegun_ = true;
   state_.objectiveValues.resize(config_.objectives.size());
-  results_->open(config_, runner_->observedSeries(), *aggregator_, state_.log);
+  results_->open(config_, runner_->output().observedSeries(), *aggregator_, state_.log);
   putEarlierReportAside();
   signalState.resultFileDescriptor = results_->table().descriptor();
-  reporter_ =
-      std::make_unique<RunReporter>(state_, results_->table(), results_->failedRuns(), parameters_->searchSpace(),
-                                    results_->simulatedValues(), &results_->pairs(), &results_->unkeptFiles(),
-                                    measureSources(config_.measures, config_.measureFile, config_.baseFolder));
-  openSeries();
-  failedRunPolicy_.emplace(config_.plannedEvaluations(), config_.failedRunFolders);
+  reporter_ = std::make_unique<RunReporter>(state_, results_->table(), results_->failedRuns(),
+                                            parameters_->searchSpace(), results_->simulatedValues(), &results_->pairs(),
+                                            &results_->unkeptFiles(), runner_->output().sources());
   EarlierEvaluations* const earlier = results_->earlierEvaluations();
+  series_ = openSeries(config_, parameters_->searchSpace(), runner_->output(),
+                       runFilePath(filePrefix_, run_files::kSeries), earlier != nullptr, state_.log);
+  if (series_) reporter_->recordSeries(*series_);
+  failedRunPolicy_.emplace(config_.plannedEvaluations(), config_.failedRunFolders);
   if (state_.job->hasWorkers()) {
     evaluator_ = std::make_unique<RankEvaluator>(*runner_, *state_.job, *reporter_, *failedRunPolicy_, earlier);
   } else {
@@ -268,81 +267,6 @@ void RunDriver::putEarlierReportAside() {
   }
 }
 
-/// An end without a time of day is the beginning of its day.
-void RunDriver::warnOfLastDay() {
-  for (const std::size_t i : runner_->shownMeasures()) {
-    const auto leftOut = runner_->observationLeftOut(i);
-    if (!leftOut) continue;
-    state_.log.warning(fmt::format(
-        "End_Date = {} is the beginning of its day: the later observations of that day are left out (output "
-        "measure {}, {} ...). With a time of day, such as 23:59, they count",
-        formatDate(config_.period.end), quotedForMessage(config_.measures[i].name),
-        formatDate(dateOfSecond(*leftOut))));
-  }
-}
-
-/// Empty for a task that keeps no simulated values.
-std::vector<KeptSeries> RunDriver::keptSeries() const {
-  constexpr double kSecondsPerDay = 86400.0;
-  const bool isExact = config_.task && config_.task->keptPrecision() == SeriesPrecision::exact;  // units follow
-  const std::vector<std::size_t>& shown = runner_->shownMeasures();
-  std::vector<KeptSeries> kept;
-  std::size_t first = 0;
-  for (const ObservedSeries& observed : runner_->observedSeries()) {
-    if (std::find(shown.begin(), shown.end(), observed.measure) != shown.end()) {
-      KeptSeries& series = kept.emplace_back();
-      series.first = first;
-      const std::int64_t origin = secondNumber(observed.start);
-      for (const double days : observed.days) series.seconds.push_back(origin + std::llround(days * kSecondsPerDay));
-    }
-    first += observed.values.size() * (isExact ? 2 : 1);
-  }
-  return kept;
-}
-
-void RunDriver::openSeries() {
-  const std::string path = runFilePath(filePrefix_, run_files::kSeries);
-  const bool goesOn = results_->earlierEvaluations() != nullptr;
-  if (!goesOn) keepEarlierResults(std::array{path}, config_.setupFile, state_.log);
-  if (runner_->shownMeasures().empty()) return;
-  RecordedSeries run;
-  run.headLines = {
-      columnName(config_.title), fmt::format("Mirevo {}", programVersion()), "Setup file: " + config_.setupFile,
-      fmt::format("Evaluation period: {} to {}", formatDate(config_.period.start), formatDate(config_.period.end))};
-  const std::string task = config_.task ? std::string(config_.task->facts().name.name) : std::string();
-  run.task = task;
-  run.measures = seriesNames(config_.measures, runner_->shownMeasures());
-  run.observations = runner_->readShownObservations();
-  run.periodFirst = secondNumber(config_.period.start);
-  run.periodLast = secondNumber(config_.period.end);
-  run.largestGap = config_.period.largestGapDays();
-  warnOfLastDay();
-  run.initialValues = ToModelScale(parameters_->searchSpace(), parameters_->searchSpace().initial);
-  run.kept = keptSeries();
-  series_ = std::make_unique<SeriesRecorder>(path, std::move(run), runTimeClock,
-                                             [this](std::string_view text) { state_.log.warning(text); });
-  if (goesOn) {
-    std::string reason;
-    const auto earlier = readTextFile(path, reason);
-    std::error_code ignored;
-    if (!earlier && std::filesystem::exists(path, ignored)) {
-      state_.log.warning(fmt::format("The series of the earlier run are not taken up: {}: {}", path, reason));
-    }
-    const SeriesTable table = earlier ? readSeriesTable(*earlier) : SeriesTable{};
-    if (table.isOf(task)) {
-      if (const std::string remains = table.remains(); !remains.empty()) {
-        state_.log.warning(
-            fmt::format("{} is cut off or damaged: {}; the series of the earlier run have no values at other times",
-                        path, remains));
-      }
-      series_->resume(table);
-    } else {
-      keepEarlierFile(path, state_.log);  // of a run of another task in between
-    }
-  }
-  reporter_->recordSeries(*series_);
-}
-
 TaskContext RunDriver::taskContext() {
   return {parameters_->searchSpace(),
           config_.parameters,
@@ -352,7 +276,7 @@ TaskContext RunDriver::taskContext() {
           state_.log,
           [this](const SearchSummary& summary) { reporter_->takeBestOf(summary); },
           filePrefix_,
-          runner_->observedSeries(),
+          runner_->output().observedSeries(),
           parameterFields(*parameters_, widestPlaceholders(runner_->templates(), config_.parameters.size())),
           [this](std::span<const double> values) { return aggregator_->aggregate(values); },
           parameters_->feasibility(),
@@ -413,28 +337,6 @@ std::vector<std::string> RunDriver::keepStatistics() {
   return report;
 }
 
-std::vector<std::string> RunDriver::closingLines(const Ending& ending) const {
-  std::vector<std::string> lines{ending.closingLine, "Ended: " + ending.time};
-  if (!reporter_) return lines;
-  const std::vector<std::string> differences = reporter_->differenceLines();
-  if (!reporter_->best()) {
-    lines.insert(lines.end(), differences.begin(), differences.end());
-    return lines;
-  }
-  const std::vector<std::string> scales = aggregator_->scaleLines();
-  lines.insert(lines.end(), scales.begin(), scales.end());
-  const BestEvaluation& best = *reporter_->best();
-  lines.push_back(fmt::format("Best evaluation: {}", best.number));
-  lines.push_back("Best aggregate: " + formatReal(best.aggregate));
-  const std::vector<std::string>& names = parameters_->searchSpace().names;
-  for (std::size_t i = 0; i < names.size(); ++i) {
-    lines.push_back(fmt::format("Best {} = {}", names[i], formatReal(best.parameterValues[i])));
-  }
-  for (const std::string& text : reporter_->differencesOfBest()) lines.push_back("Warning: " + text);
-  lines.insert(lines.end(), differences.begin(), differences.end());
-  return lines;
-}
-
 /// Adds to the record what is known at the end of the run.
 void RunDriver::completeRecord(const Ending& ending) {
   RunRecord& record = results_->record().record();
@@ -443,26 +345,14 @@ void RunDriver::completeRecord(const Ending& ending) {
   record.ended = ending.time;
   record.warningCount = state_.log.warningCount();
   record.warnings = state_.log.warnings();
-  if (!reporter_) return;
-  record.initialEvaluation = reporter_->initial();
-  if (const auto& best = reporter_->best()) record.best = ShownEvaluation{best->number, best->aggregate};
-  record.evaluations = reporter_->evaluationCount();
-  record.failed = reporter_->failedCount();
-  record.failuresByKind.clear();
-  for (const auto& [kind, count] : reporter_->failures().counts()) {
-    record.failuresByKind.emplace_back(failureKindKey(kind), count.count);
-  }
-  record.scales.clear();
-  if (aggregator_->scaleLines().empty()) return;  // there is no scale, or it is not known
-  for (std::size_t i = 0; i < config_.objectives.size(); ++i) {
-    record.scales.push_back({config_.objectives[i].name, aggregator_->sigma()[i], aggregator_->mu()[i]});
-  }
+  if (reporter_) addFindings(*reporter_, *aggregator_, config_.objectives, record);
 }
 
 std::optional<RunDriver::Unwritten> RunDriver::closeResults(const Ending& ending, std::span<const std::string> report) {
   if (reporter_) reporter_->settle(*aggregator_);
   if (series_) series_->finish(reporter_->best());
-  std::vector<std::string> lines = closingLines(ending);
+  std::vector<std::string> lines{ending.closingLine, "Ended: " + ending.time};
+  if (reporter_) addFindings(*reporter_, *aggregator_, parameters_->searchSpace().names, lines);
   lines.insert(lines.end(), report.begin(), report.end());
   const EndingSignalsHeld held;
   signalState.resultFileDescriptor = -1;
@@ -527,8 +417,7 @@ void RunDriver::finish(const TaskOutcome& outcome) {
 }
 
 std::string RunDriver::warningCountText() const {
-  const int count = state_.log.warningCount();
-  return count == 1 ? std::string("1 warning") : fmt::format("{} warnings", count);
+  return countText(static_cast<std::size_t>(state_.log.warningCount()), "warning");
 }
 
 std::string RunDriver::whereWarningsAre() const {

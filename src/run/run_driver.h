@@ -61,9 +61,6 @@ class RunDriver final {
   void logSetup();
   void openResults();
   void putEarlierReportAside();
-  std::vector<KeptSeries> keptSeries() const;
-  void warnOfLastDay();
-  void openSeries();
   /// Runs the task, if there is one, and writes its files.
   TaskOutcome runTask();
   void writeFiles(std::span<const TaskFile> files);
@@ -92,7 +89,6 @@ class RunDriver final {
   std::string warningCountText() const;
   std::string whereWarningsAre() const;
   void tellOfWarnings() const;
-  std::vector<std::string> closingLines(const Ending& ending) const;
 
   RunState state_;
   FileLock runLock_;      ///< on the files with the setup's name

@@ -194,8 +194,7 @@ std::vector<std::string> RunReporter::differenceWarnings() const {
     if (count == 0) continue;
     const bool isOne = count == 1;
     const char* const named = count > kMostDifferencesShown ? "the first of them" : isOne ? "it" : "them";
-    sentences.push_back(fmt::format("{} {}: the end of {} names {}",
-                                    isOne ? "1 evaluation" : fmt::format("{} evaluations", count),
+    sentences.push_back(fmt::format("{} {}: the end of {} names {}", countText(count, "evaluation"),
                                     isOne ? texts.ofOne : texts.ofSeveral, fileNameOf(results_.path()), named));
   }
   return sentences;
@@ -205,9 +204,9 @@ std::string RunReporter::unkeptWarning() const {
   if (unkeptFiles_ == nullptr || unkeptFiles_->files().empty()) return {};
   const UnkeptByNumber& files = unkeptFiles_->files();
   return fmt::format(
-      "Output files of {} evaluation{} could not be kept, see {}; the first: No. {}. With Restart = 1 the setup makes "
-      "their model runs again",
-      files.size(), files.size() == 1 ? "" : "s", fileNameOf(unkeptFiles_->path()), files.begin()->first);
+      "Output files of {} could not be kept, see {}; the first: No. {}. With Restart = 1 the setup makes their model "
+      "runs again",
+      countText(files.size(), "evaluation"), fileNameOf(unkeptFiles_->path()), files.begin()->first);
 }
 
 std::vector<std::string> RunReporter::differencesOfBest() const {

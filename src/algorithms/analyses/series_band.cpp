@@ -9,6 +9,7 @@
 #include "algorithms/numbers/sample_summary.h"
 #include "common/calendar.h"
 #include "common/text.h"
+#include "measures/dates.h"
 
 namespace mirevo {
 namespace {
@@ -68,13 +69,12 @@ std::string fewerRunsText(const SeriesBand& band) {
 }
 
 std::string seriesBandText(std::string_view title, const ObservedSeries& observed, const SeriesBand& band) {
-  constexpr double kSecondsPerDay = 86400.0;
   std::string text = fmt::format("# Band of {}\n", columnName(title));
   if (const std::string fewer = fewerRunsText(band); !fewer.empty()) text += fmt::format("# {}\n", fewer);
   text += "time,observed,5 %,50 %,95 %\n";
   const std::int64_t origin = secondNumber(observed.start);
   for (std::size_t t = 0; t < observed.days.size(); ++t) {
-    const DateRecord time = dateOfSecond(origin + std::llround(observed.days[t] * kSecondsPerDay));
+    const DateRecord time = dateOfSecond(secondAfter(origin, observed.days[t]));
     text += fmt::format("{},{},{},{},{}\n", formatDate(time), cell(observed.values[t]), cell(band.lower[t]),
                         cell(band.median[t]), cell(band.upper[t]));
   }

@@ -15,6 +15,7 @@
 
 #include "common/clock.h"
 #include "common/descriptor.h"
+#include "platform/processes/child_process.h"
 #include "platform/processes/close_descriptors.h"
 
 namespace mirevo {
@@ -56,10 +57,8 @@ void awaitEnd(pid_t program, int watched) {
 }
 
 std::string howEnded(int status) {
-  if (!WIFSIGNALED(status)) return fmt::format("has ended with code {}", WEXITSTATUS(status));
-  const char* description = ::sigdescr_np(WTERMSIG(status));
-  return fmt::format("was ended by signal {}{}", WTERMSIG(status),
-                     description == nullptr ? "" : fmt::format(" ({})", description));
+  if (WIFSIGNALED(status)) return endedBySignal(WTERMSIG(status));
+  return fmt::format("has ended with code {}", WEXITSTATUS(status));
 }
 
 }  // namespace
@@ -82,18 +81,11 @@ bool ChildGuard::start(std::string& reason) {
         "as it cannot be told so (pidfd_open: {})",
         kLookMilliseconds / 1000.0, std::strerror(errno));
   }
-  // Blocked during the fork, so that no handler of the program ever runs in the guard.
-  sigset_t all;
-  sigset_t before;
-  ::sigfillset(&all);
-  ::sigprocmask(SIG_SETMASK, &all, &before);
-  process_ = ::fork();
+  process_ = forkWithSignalsBlocked();
   if (process_ == 0) guard(program, watched.get(), table_, mark_);
-  const int error = errno;
-  ::sigprocmask(SIG_SETMASK, &before, nullptr);
   if (process_ > 0) return true;
   process_ = 0;
-  reason = std::strerror(error);
+  reason = std::strerror(errno);
   return false;
 }
 

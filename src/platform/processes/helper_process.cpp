@@ -18,10 +18,9 @@
 #include <utility>
 #include <vector>
 
-#include <fmt/core.h>
-
 #include "common/files.h"
 #include "common/reading_watch.h"
+#include "platform/processes/child_process.h"
 #include "platform/processes/close_descriptors.h"
 
 namespace mirevo {
@@ -69,11 +68,10 @@ int reap(pid_t process) {
   int status = -1;
   for (int nap = 0; nap < kMostNaps; ++nap) {
     const pid_t ended = ::waitpid(process, &status, WNOHANG);
-    if (ended == process) {
+    if (ended == process || (ended < 0 && errno != EINTR)) {  // in the second case something else has reaped it
       std::erase(unreapedHelpers(), process);
-      return status;
+      return ended == process ? status : -1;
     }
-    if (ended < 0 && errno != EINTR) break;
     ::nanosleep(&kNap, nullptr);
   }
   return -1;
@@ -91,15 +89,9 @@ bool HelperProcess::start(void (*serve)(int), std::string& reason) {
     return false;
   }
   const pid_t parent = ::getpid();
-  // Blocked during the fork, so that no handler of the program ever runs in the helper.
-  sigset_t all;
-  sigset_t before;
-  ::sigfillset(&all);
-  ::sigprocmask(SIG_SETMASK, &all, &before);
-  process_ = ::fork();
+  process_ = forkWithSignalsBlocked();
   if (process_ == 0) runHelper(parent, sockets[1], serve);
   const int error = errno;
-  ::sigprocmask(SIG_SETMASK, &before, nullptr);
   ::close(sockets[1]);
   if (process_ > 0) {
     unreapedHelpers().push_back(process_);
@@ -131,12 +123,7 @@ void HelperProcess::end() {
 std::string HelperProcess::endAndDescribe() {
   if (socket_ >= 0) ::close(std::exchange(socket_, -1));
   const int status = reap(std::exchange(process_, 0));
-  if (status != -1 && WIFSIGNALED(status)) {
-    const char* description = ::sigdescr_np(WTERMSIG(status));
-    return fmt::format("was ended by signal {}{}", WTERMSIG(status),
-                       description == nullptr ? "" : fmt::format(" ({})", description));
-  }
-  return "has ended";
+  return status != -1 && WIFSIGNALED(status) ? endedBySignal(WTERMSIG(status)) : "has ended";
 }
 
 HelperProcess::Outcome HelperProcess::send(const void* bytes, std::size_t size, ReadingWatch& watch) {

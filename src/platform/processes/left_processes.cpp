@@ -200,7 +200,7 @@ void LeftProcesses::addKilled(int number, const std::string& batchFile, std::vec
         adopted_.insert_or_assign(found.id, Adopted{.name = found.name, .slot = number, .candidates = {}})
             .first->second;
     process.isKilled = true;
-    slot.left.push_back({found.id, std::move(found.name), batchFile, {}});
+    slot.left.push_back({.id = found.id, .name = std::move(found.name), .batchFile = batchFile, .problem = {}});
     if (::kill(found.id, 0) != 0 && errno == EPERM) giveUp(found.id, process, slot, std::strerror(EPERM));
   }
 }

@@ -28,6 +28,7 @@
 #include "common/text.h"
 #include "platform/processes/argument_text.h"
 #include "platform/processes/batch_file_hints.h"
+#include "platform/processes/child_process.h"
 #include "platform/processes/helper_process.h"
 #include "platform/processes/own_files.h"
 #include "platform/processes/process_folder.h"
@@ -355,10 +356,7 @@ void PosixProcessLauncher::finishItem(Slot& slot, int code, int status) {
     slot.failure = {BatchFailure::Kind::timedOut, 0,
                     fmt::format("{} was ended because it ran longer than {:g} seconds", name, maxSeconds_)};
   } else if (code != CLD_EXITED) {
-    const char* description = ::sigdescr_np(status);
-    slot.failure = {BatchFailure::Kind::signal, status,
-                    fmt::format("{} was ended by signal {}{}", name, status,
-                                description == nullptr ? "" : fmt::format(" ({})", description))};
+    slot.failure = {BatchFailure::Kind::signal, status, fmt::format("{} {}", name, endedBySignal(status))};
   } else if (status != 0) {
     slot.failure = {
         BatchFailure::Kind::exitCode, status,

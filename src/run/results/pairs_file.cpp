@@ -83,6 +83,7 @@ std::optional<MeasurePairs> pairsOf(std::span<const std::string> cells) {
   if (!measure || !count || !missing || !form) return std::nullopt;
   MeasurePairs pairs;
   pairs.measure = *measure - 1;
+  pairs.count = *count;
   pairs.missingCount = *missing;
   pairs.file = *form;
   if (*count == 0) return pairs;
@@ -91,7 +92,11 @@ std::optional<MeasurePairs> pairsOf(std::span<const std::string> cells) {
   const auto observed = summaryOf(cells.subspan(6, 3));
   const auto simulated = summaryOf(cells.subspan(9, 3));
   if (!first || !last || !observed || !simulated) return std::nullopt;
-  return MeasurePairs{*measure - 1, *count, *missing, *first, *last, *observed, *simulated, *form};
+  pairs.first = *first;
+  pairs.last = *last;
+  pairs.observed = *observed;
+  pairs.simulated = *simulated;
+  return pairs;
 }
 
 /// Lines that are not for people, the header row among them.

@@ -80,7 +80,7 @@ void SimulatedValuesFile::add(std::span<const double> parameterValues, const Eva
     bytes.append(reinterpret_cast<const char*>(values->data()), values->size() * sizeof(double));
   }
   appendBytes(bytes, checksumWithRow(bytes, parameterValues, result.measureValues));
-  file_.append(bytes);
+  if (!file_.append(bytes)) return;
   noteOffset(result.number, file_.size() - std::ssize(bytes));
 }
 

@@ -23,9 +23,8 @@ struct KeptValues {
 /// The simulated values at the observation times of every evaluation, and its measures in 64 bits, for a task that uses
 /// them: the result file does not hold them, and a restarted run needs those of the evaluations that it does not
 /// repeat. Binary, one record per evaluation: its number, the values, the measures, a checksum of all and of the
-/// parameter values and measures in its row. Not meant for
-/// other programs: on a machine with another number format the file counts as damaged, and the evaluations are
-/// repeated. Of several records of an evaluation the last counts.
+/// parameter values and measures in its row. Not meant for other programs: on a machine with another number format the
+/// file counts as damaged, and the evaluations are repeated. Of several records of an evaluation the last counts.
 class SimulatedValuesFile final {
  public:
   /// `valueCount`: simulated values of one evaluation. `isReadBack`: the task reads them with valuesOf() and columns(),

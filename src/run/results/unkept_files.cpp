@@ -5,7 +5,6 @@
 #include <utility>
 
 #include "common/data_table.h"
-#include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/text.h"
 
@@ -61,10 +60,7 @@ std::set<int> UnkeptFiles::goOn(const std::set<int>& numbers, const std::set<std
     std::erase_if(files, [&](const UnkeptFile& file) { return !names.contains(file.name); });
   }
   std::erase_if(files_, [&](const auto& entry) { return !numbers.contains(entry.first) || entry.second.empty(); });
-  const std::string text = unkeptTableText(tableHead_, files_);
-  std::string reason;
-  if (present != text && !replaceFile(path_, text, reason)) fatalError("Error: Unable to write to " + path_, reason);
-  file_.openToContinue(path_);
+  file_.openToContinue(path_, unkeptTableText(tableHead_, files_));
   std::set<int> found;
   for (const auto& [number, files] : files_) found.insert(number);
   return found;

@@ -1,12 +1,10 @@
 #include "run/setup/file_roles.h"
 
 #include <algorithm>
-#include <filesystem>
 #include <optional>
 #include <span>
 #include <string>
 #include <string_view>
-#include <system_error>
 #include <vector>
 
 #include <fmt/core.h>
@@ -16,16 +14,10 @@
 #include "common/run_files.h"
 #include "common/take_text.h"
 #include "common/text.h"
+#include "platform/processes/leaving_links.h"
 
 namespace mirevo {
 namespace {
-
-/// With links followed; parts that do not exist stay as they are.
-std::string resolved(const std::string& path) {
-  std::error_code failed;
-  const std::filesystem::path result = std::filesystem::weakly_canonical(path, failed);
-  return failed ? path : result.string();
-}
 
 /// Whether the name, after that of the setup, is that of the run's file.
 bool isNamedLike(std::string_view rest, const RunFile& file) {
@@ -51,11 +43,11 @@ std::optional<std::string> runsOwn(const std::string& path, const std::string& p
 
 /// The same for the setup's files, which are beside it, and the folders that may be elsewhere.
 std::optional<std::string> runsOwn(const std::string& path, const RunConfig& config, std::span<const RunFile> files) {
-  const std::string target = resolved(path);
+  const std::string target = resolvedPath(path);
   for (const std::string& prefix :
        {fmt::format("{}/{}", config.setupFolder, config.setupName), processFolderPrefix(config)}) {
     const std::size_t slash = prefix.rfind('/');
-    const std::string folder = resolved(prefix.substr(0, std::max<std::size_t>(slash, 1)));
+    const std::string folder = resolvedPath(prefix.substr(0, std::max<std::size_t>(slash, 1)));
     const std::string from = (folder == "/" ? std::string() : folder) + prefix.substr(slash);
     if (auto own = runsOwn(target, from, files)) return own;
   }

@@ -11,6 +11,7 @@
 #include "algorithms/analyses/covariance.h"
 #include "common/calendar.h"
 #include "evaluation/stored_results.h"
+#include "measures/dates.h"
 #include "measures/period_series.h"
 #include "parameters/parameter_model.h"
 #include "run/tasks/analysis_names.h"
@@ -19,7 +20,6 @@
 namespace mirevo {
 namespace {
 
-constexpr double kSecondsPerDay = 86400.0;
 constexpr CodeName kTypeNames[] = {{0, "local"}};
 
 const SettingSection<SensitivityTask>& sensitivitySection() {
@@ -100,7 +100,7 @@ ComparedValues compareSeries(const TaskContext& context, std::span<const Evaluat
       const double weight = isAbove ? measure.weightAbove : measure.weight;
       compared.observed.push_back(weight == 0.0 ? std::numeric_limits<double>::quiet_NaN() : series.values[t]);
       compared.weights.push_back(weight * weight);
-      compared.labels.push_back({measure.name, isoTime(origin + std::llround(series.days[t] * kSecondsPerDay))});
+      compared.labels.push_back({measure.name, isoTime(secondAfter(origin, series.days[t]))});
     }
   }
   return compared;

@@ -1,0 +1,32 @@
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "measures/objective_functions.h"
+#include "measures/output_measure.h"
+#include "parameters/template_file.h"
+
+namespace mirevo {
+
+/// All that is needed to turn a parameter set into a result, except the parameters themselves. File names are absolute.
+struct ModelDescription {
+  std::string baseFolder;
+  std::string fileTag;  ///< name of the setup; part of the names of converted templates in process folders
+  std::vector<ParameterFileItem> parameterFiles;
+  std::vector<OutputMeasure> measures;
+  std::string measureFile;  ///< output-measure file; empty when no measure is of interface type 1
+  EvaluationPeriod period;
+  double minimumCoverage = 0.0;  ///< share of the first successful run's pairs below which a run fails
+  std::vector<ObjectiveFunction> objectives;
+  std::vector<std::string> savedFiles;  ///< files kept from every model run
+  std::string savedFolder;              ///< where they are kept
+  std::string failedFolderPrefix;       ///< path of a failed run's folder, without the evaluation number that follows
+  int runsAtOnce = 1;                 ///< model runs side by side, of all ranks, whose room on the disk is left to them
+  bool isForRuns = true;              ///< model runs follow
+  bool computeExactMeasures = false;  ///< results hold the measures in 64 bits, too
+  bool keepSimulatedValues = false;   ///< results hold the simulated values at the observation times
+  SeriesPrecision keptPrecision = SeriesPrecision::single;
+};
+
+}  // namespace mirevo

@@ -1,0 +1,46 @@
+#include "run/run_findings.h"
+
+#include <cstddef>
+
+#include <fmt/core.h>
+
+#include "common/text.h"
+#include "evaluation/evaluation_result.h"
+
+namespace mirevo {
+
+void addFindings(const RunReporter& reporter, const ObjectiveAggregator& aggregator,
+                 std::span<const std::string> parameterNames, std::vector<std::string>& lines) {
+  if (reporter.best()) {
+    const std::vector<std::string> scales = aggregator.scaleLines();
+    lines.insert(lines.end(), scales.begin(), scales.end());
+    const BestEvaluation& best = *reporter.best();
+    lines.push_back(fmt::format("Best evaluation: {}", best.number));
+    lines.push_back("Best aggregate: " + formatReal(best.aggregate));
+    for (std::size_t i = 0; i < parameterNames.size(); ++i) {
+      lines.push_back(fmt::format("Best {} = {}", parameterNames[i], formatReal(best.parameterValues[i])));
+    }
+    for (const std::string& text : reporter.differencesOfBest()) lines.push_back("Warning: " + text);
+  }
+  const std::vector<std::string> differences = reporter.differenceLines();
+  lines.insert(lines.end(), differences.begin(), differences.end());
+}
+
+void addFindings(const RunReporter& reporter, const ObjectiveAggregator& aggregator,
+                 std::span<const ObjectiveFunction> objectives, RunRecord& record) {
+  record.initialEvaluation = reporter.initial();
+  if (const auto& best = reporter.best()) record.best = ShownEvaluation{best->number, best->aggregate};
+  record.evaluations = reporter.evaluationCount();
+  record.failed = reporter.failedCount();
+  record.failuresByKind.clear();
+  for (const auto& [kind, count] : reporter.failures().counts()) {
+    record.failuresByKind.emplace_back(failureKindKey(kind), count.count);
+  }
+  record.scales.clear();
+  if (aggregator.scaleLines().empty()) return;  // there is no scale, or it is not known
+  for (std::size_t i = 0; i < objectives.size(); ++i) {
+    record.scales.push_back({objectives[i].name, aggregator.sigma()[i], aggregator.mu()[i]});
+  }
+}
+
+}  // namespace mirevo

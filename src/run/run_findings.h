@@ -1,0 +1,20 @@
+#pragma once
+
+#include <span>
+#include <string>
+#include <vector>
+
+#include "measures/objective_functions.h"
+#include "run/results/run_record.h"
+#include "run/run_reporter.h"
+
+namespace mirevo {
+
+/// What a run has found by its end: for the last lines of its result file, ...
+void addFindings(const RunReporter& reporter, const ObjectiveAggregator& aggregator,
+                 std::span<const std::string> parameterNames, std::vector<std::string>& lines);
+/// ... and for its record.
+void addFindings(const RunReporter& reporter, const ObjectiveAggregator& aggregator,
+                 std::span<const ObjectiveFunction> objectives, RunRecord& record);
+
+}  // namespace mirevo
