@@ -25,6 +25,7 @@
 #include "common/run_files.h"
 #include "common/text.h"
 #include "measures/measure_file.h"
+#include "measures/statistics.h"
 #include "parameters/read_template.h"
 #include "platform/processes/folder_room.h"
 #include "platform/processes/leaving_links.h"
@@ -410,10 +411,11 @@ EvaluationResult ModelRunner::judge(int slot) {
   const auto measure = std::find_if_not(result.measureValues.begin(), result.measureValues.end(), isFinite);
   if (measure != result.measureValues.end()) {
     const auto i = static_cast<std::size_t>(measure - result.measureValues.begin());
-    return failedResult(makeFailure(
-        Kind::resultNotFinite,
-        fmt::format("output measure \"{}\" is {}", trimTrailing(description_.measures[i].name), formatReal(*measure)),
-        slot));
+    return failedResult(
+        makeFailure(Kind::resultNotFinite,
+                    fmt::format("output measure \"{}\" is {}{}", trimTrailing(description_.measures[i].name),
+                                formatReal(*measure), describeUndefined(description_.measures[i])),
+                    slot));
   }
   result.objectiveValues = objectiveFunctionValues(description_.objectives, result.measureValues);
   const auto objective = std::find_if_not(result.objectiveValues.begin(), result.objectiveValues.end(), isFinite);
