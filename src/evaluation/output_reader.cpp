@@ -19,6 +19,7 @@
 #include "common/text.h"
 #include "measures/dates.h"
 #include "measures/measure_file.h"
+#include "measures/statistics.h"
 #include "platform/processes/leaving_links.h"
 
 namespace mirevo {
@@ -129,8 +130,8 @@ EvaluationResult OutputReader::read(const OutputFiles& files) {
   if (measure != result.measureValues.end()) {
     const auto i = static_cast<std::size_t>(measure - result.measureValues.begin());
     return failedResult(failureOf(
-        Kind::resultNotFinite,
-        fmt::format("output measure \"{}\" is {}", trimTrailing(description_.measures[i].name), formatReal(*measure))));
+        Kind::resultNotFinite, fmt::format("output measure \"{}\" is {}{}", trimTrailing(description_.measures[i].name),
+                                           formatReal(*measure), describeUndefined(description_.measures[i]))));
   }
   result.objectiveValues = objectiveFunctionValues(description_.objectives, result.measureValues);
   const auto objective = std::find_if_not(result.objectiveValues.begin(), result.objectiveValues.end(), isFinite);

@@ -12,6 +12,7 @@
 #include "common/text.h"
 #include "measures/dates.h"
 #include "measures/statistics.h"
+#include "measures/value_transformation.h"
 
 namespace mirevo {
 
@@ -114,14 +115,19 @@ void forEachObservation(const SeriesItem& simulation, const SeriesItem& observat
   }
 }
 
+/// The small value of Pushpalatha et al. (2012), doi:10.1016/j.jhydrol.2011.11.055, as a share of the observed mean.
+constexpr double kShareOfMean = 0.01;
+
 /// The pairs in the period, and the number and first time of the observations without a simulated value.
 MeasureStatistics collectPairs(const SeriesItem& simulation, const SeriesItem& observation,
                                const EvaluationPeriod& period) {
   MeasureStatistics statistics;
   std::optional<double> firstUnused;
+  double sumOfObserved = 0.0;
   forEachObservation(simulation, observation, period,
                      [&](double time, double observed, const std::optional<double>& simulated) {
                        ++statistics.observationCount;
+                       sumOfObserved += observed;
                        if (simulated) {
                          statistics.times.push_back(time);
                          statistics.simulatedValues.push_back(*simulated);
@@ -138,6 +144,8 @@ MeasureStatistics collectPairs(const SeriesItem& simulation, const SeriesItem& o
                            formatDate(period.start), formatDate(period.end), describeSpan(simulation),
                            describeSpan(observation)));
   }
+  // Of all observations, so that it is the same for every model run.
+  statistics.epsilon = kShareOfMean * std::abs(sumOfObserved / static_cast<double>(statistics.observationCount));
   if (firstUnused) statistics.firstUnused = dateOfSecond(secondAfter(secondNumber(simulation.start), *firstUnused));
   return statistics;
 }
@@ -147,8 +155,9 @@ template <class Number>
 void addDifferenceStatistics(const Weights<Number>& weights, MeasureStatistics& statistics) {
   Number sum = 0;
   Number sumOfSquares = 0;
-  for (std::size_t i = 0; i < statistics.simulatedValues.size(); ++i) {
-    const Number e = weights.difference(statistics.simulatedValues[i], statistics.observedValues[i]);
+  const ValuePairs pairs = comparedPairs(statistics);
+  for (std::size_t i = 0; i < pairs.simulated.size(); ++i) {
+    const Number e = weights.difference(pairs.simulated[i], pairs.observed[i]);
     sum += e;
     sumOfSquares += e * e;
   }
@@ -199,7 +208,22 @@ void addPeakStatistics(const SeriesItem& simulation, const SeriesItem& observati
   statistics.lowDifference = weights.difference(simulatedMin, observedMin);
 }
 
+void transformPairs(const OutputMeasure& measure, MeasureStatistics& statistics) {
+  if (measure.epsilon) statistics.epsilon = *measure.epsilon;
+  const ValueTransformation used = transformationOf(measure);
+  if (used == ValueTransformation::none) return;
+  const auto ofValues = [&](const std::vector<double>& values) {
+    return transformed(values, used, statistics.epsilon, measure.boxCoxLambda);
+  };
+  statistics.transformed = TransformedPairs{ofValues(statistics.simulatedValues), ofValues(statistics.observedValues)};
+}
+
 }  // namespace
+
+ValuePairs comparedPairs(const MeasureStatistics& statistics) {
+  if (statistics.transformed) return {statistics.transformed->simulatedValues, statistics.transformed->observedValues};
+  return {statistics.simulatedValues, statistics.observedValues};
+}
 
 void requireItem(TimeSeriesObject& series, const SeriesReference& reference) {
   const std::string name(trimTrailing(reference.fileName));
@@ -221,6 +245,7 @@ MeasureStatistics computeMeasureStatistics(const OutputMeasure& measure, const E
   const SeriesItem simulated = readItem(simulation, measure.simulation, precision);
   const SeriesItem observed = readItem(observation, measure.observation, precision);
   MeasureStatistics statistics = collectPairs(simulated, observed, period);
+  transformPairs(measure, statistics);
   const auto add = [&](const auto& weights) {
     addDifferenceStatistics(weights, statistics);
     if (wantPeaks) addPeakStatistics(simulated, observed, period, weights, statistics);
@@ -253,8 +278,7 @@ bool hasPairs(const OutputMeasure& measure, const EvaluationPeriod& period, Time
 }
 
 double selectStatistic(const MeasureStatistics& statistics, StatisticType type) {
-  const Statistic& statistic = statisticOf(type);
-  return statistic.inObjective(statistic.value(statistics));
+  return statisticOf(type).value(statistics);
 }
 
 double measureValue(const OutputMeasure& measure, const EvaluationPeriod& period, TimeSeriesObject& simulation,

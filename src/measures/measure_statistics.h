@@ -5,27 +5,40 @@
 #include <string>
 #include <vector>
 
+#include "measures/criteria.h"
 #include "measures/measure_file.h"
 #include "measures/output_measure.h"
 #include "platform/series/time_series_object.h"
 
 namespace mirevo {
 
-/// The basis of the statistics of one measure: the pairs of simulated and observed values, and five statistics that are
-/// computed together: deliberately in 32 bits throughout, each number here then being one of 32 bits, or, if exact, in
-/// 64 bits throughout.
+/// One of each per pair.
+struct TransformedPairs {
+  std::vector<double> simulatedValues;
+  std::vector<double> observedValues;
+};
+
+/// The basis of the statistics of one measure: the pairs of simulated and observed values, and five statistics of their
+/// weighted differences that are computed together: deliberately in 32 bits throughout, each number here then being one
+/// of 32 bits, or, if exact, in 64 bits throughout.
 struct MeasureStatistics {
   double mean = 0.0;
   double rootMeanSquare = 0.0;
   double standardDeviation = 0.0;
   double peakDifference = 0.0;
   double lowDifference = 0.0;
-  std::vector<double> times;              ///< of the pairs, in days since the start of the simulated series
-  std::vector<double> simulatedValues;    ///< one per pair
-  std::vector<double> observedValues;     ///< one per pair
+  std::vector<double> times;            ///< of the pairs, in days since the start of the simulated series
+  std::vector<double> simulatedValues;  ///< one per pair
+  std::vector<double> observedValues;   ///< one per pair
+  /// The pairs as the statistics compare them, if that is not as they are.
+  std::optional<TransformedPairs> transformed;
+  double epsilon = 0.0;                   ///< the small value that is added where a logarithm or inverse is taken
   std::size_t observationCount = 0;       ///< observations in the period that are not missing, whether used or not
   std::optional<DateRecord> firstUnused;  ///< time of the first observation without a simulated value
 };
+
+/// The pairs that the statistics compare.
+ValuePairs comparedPairs(const MeasureStatistics& statistics);
 
 /// Makes the item of an opened file ready for reading. Throws FatalError with "Error: Item No. % not found in " or
 /// "Error getting data of TS item in " and the file's name.
@@ -55,7 +68,7 @@ bool hasPairs(const OutputMeasure& measure, const EvaluationPeriod& period, Time
 std::string describeSpan(const TimeSeriesObject& series, const std::string& fileName);
 std::string describeLackOfObservations(const TimeSeriesObject& series, int item, const std::string& fileName);
 
-/// The contribution to an objective function of the statistic that `Statistic_Type` selects.
+/// The statistic that `Statistic_Type` selects, on its own scale.
 double selectStatistic(const MeasureStatistics& statistics, StatisticType type);
 
 /// The value of a measure of interface type 0, as from selectStatistic().

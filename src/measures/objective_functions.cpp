@@ -9,6 +9,7 @@
 
 #include "common/fatal_error.h"
 #include "common/text.h"
+#include "measures/statistics.h"
 
 namespace mirevo {
 namespace {
@@ -61,6 +62,12 @@ SampleStatistics statisticsOf(std::span<const std::vector<double>> sample, std::
 
 }  // namespace
 
+MeasureTerm::MeasureTerm(std::size_t measureIndex, const OutputMeasure& measure) : index(measureIndex) {
+  if (!isCriterion(measure)) return;  // the differences have their weights already
+  weight = measure.weight;
+  contribution = statisticOf(measure.statisticType).inObjective;
+}
+
 std::string aggregationMethodName(AggregationMethod method) {
   switch (method) {
     case AggregationMethod::none:
@@ -79,9 +86,9 @@ std::vector<double> objectiveFunctionValues(std::span<const ObjectiveFunction> f
                                             std::span<const double> measureValues) {
   std::vector<double> values(functions.size(), 0.0);
   for (std::size_t j = 0; j < functions.size(); ++j) {
-    for (const std::size_t measure : functions[j].measures) {
-      assert(measure < measureValues.size());
-      const double v = measureValues[measure];
+    for (const MeasureTerm& term : functions[j].measures) {
+      assert(term.index < measureValues.size());
+      const double v = term.valueOf(measureValues[term.index]);
       switch (functions[j].functionType) {
         case FunctionType::sum:
           values[j] += v;

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <optional>
 #include <span>
@@ -7,6 +8,7 @@
 #include <vector>
 
 #include "common/settings/code_name.h"
+#include "measures/output_measure.h"
 
 namespace mirevo {
 
@@ -17,12 +19,30 @@ enum class AggregationMethod : std::int32_t { none = 0, commonDistance = 1, comm
 inline constexpr CodeName kAggregationMethodNames[] = {
     {0, "none"}, {1, "common distance"}, {2, "common probability"}, {3, "zero"}};
 
+/// An output measure in an objective function.
+struct MeasureTerm {
+  std::size_t index = 0;                     ///< 0-based, of the run's output measures
+  double weight = 1.0;                       ///< of the contribution
+  double (*contribution)(double) = nullptr;  ///< what a value of the measure counts as; null: as it is
+
+  MeasureTerm(std::size_t measureIndex)
+      : index(measureIndex) {}  // NOLINT(google-explicit-constructor): an index is a plain term
+  /// The term of a measure with this index: of a statistic without a code its contribution, with the measure's weight.
+  MeasureTerm(std::size_t measureIndex, const OutputMeasure& measure);
+
+  bool operator==(const MeasureTerm&) const = default;
+
+  double valueOf(double measureValue) const {
+    return contribution == nullptr ? measureValue : weight * contribution(measureValue);
+  }
+};
+
 /// Combines output measures into one value, which has a weight in the aggregate.
 struct ObjectiveFunction {
   std::string name;
   FunctionType functionType = FunctionType::sum;
   double weight = 1.0;
-  std::vector<std::size_t> measures;        ///< 0-based indices into the run's output measures
+  std::vector<MeasureTerm> measures;
   std::optional<double> standardDeviation;  ///< σ of the transformation, if the setup gives it
   std::optional<double> location;           ///< μ, likewise
 };

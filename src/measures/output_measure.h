@@ -1,7 +1,9 @@
 #pragma once
 
 #include <cstdint>
+#include <optional>
 #include <string>
+#include <string_view>
 
 #include "common/date_record.h"
 #include "common/settings/code_name.h"
@@ -22,6 +24,16 @@ enum class StatisticType : std::int32_t {
   lowDifference = 4
 };
 
+/// What is done with both values of a pair before a statistic is computed.
+enum class ValueTransformation : std::int32_t { none, logarithm, squareRoot, inverse, boxCox, rank };
+/// Without codes: names only, in the order of the enumerators.
+inline constexpr CodeName kValueTransformationNames[] = {{std::nullopt, "none"},        {std::nullopt, "logarithm"},
+                                                         {std::nullopt, "square root"}, {std::nullopt, "inverse"},
+                                                         {std::nullopt, "Box-Cox"},     {std::nullopt, "rank"}};
+
+/// The transformation with this name, in any letter case.
+std::optional<ValueTransformation> findTransformation(std::string_view name);
+
 /// One item of a time-series file.
 struct SeriesReference {
   std::string fileName;  ///< absolute; trailing blanks trimmed
@@ -38,7 +50,12 @@ struct OutputMeasure {
   InterfaceType interfaceType = InterfaceType::timeSeries;
   std::int32_t measurementNo = 1;  ///< which number of the output-measure file, from 1
   StatisticType statisticType = StatisticType::mean;
-  double weight = 1.0;         ///< of differences where the simulation is at or below the observation
+  ValueTransformation transformation = ValueTransformation::none;
+  std::optional<double> epsilon;  ///< added to the values before a logarithm, inverse or power; empty: of the default
+  double boxCoxLambda = 0.25;     ///< exponent of the Box-Cox transformation; 0: the logarithm
+  /// Of differences where the simulation is at or below the observation; of a statistic without a code, of its
+  /// contribution to the objective function.
+  double weight = 1.0;
   double weightAbove = 1.0;    ///< of differences where it is above
   std::string functionName;    ///< the objective function that it belongs to; empty: none
   SeriesReference simulation;  ///< in or below the base folder

@@ -245,7 +245,7 @@ const ResultRow* ReportBuilder::rowOf(int number) const {
 void ReportBuilder::addMeasures() {
   for (std::size_t i = 0; i < config_.measures.size(); ++i) {
     const OutputMeasure& measure = config_.measures[i];
-    data_.measures.push_back({measure.name, std::string(statisticName(measure)), measure.weight, measure.functionName,
+    data_.measures.push_back({measure.name, statisticName(measure), measure.weight, measure.functionName,
                               valueOf(initial_, &ResultRow::measures, i), valueOf(best_, &ResultRow::measures, i)});
   }
   for (std::size_t i = 0; i < config_.objectives.size(); ++i) {

@@ -12,7 +12,7 @@
 namespace mirevo {
 namespace {
 
-ObjectiveFunction function(std::string name, FunctionType type, std::vector<std::size_t> measures) {
+ObjectiveFunction function(std::string name, FunctionType type, std::vector<MeasureTerm> measures) {
   return {.name = std::move(name), .functionType = type, .measures = std::move(measures)};
 }
 

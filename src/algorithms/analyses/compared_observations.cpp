@@ -47,8 +47,8 @@ IncomparableOutputs ofObjectives(const IncomparableOutputs& ofMeasures, std::spa
   for (const std::vector<std::string>& reasons : ofMeasures) {
     std::vector<std::string>& row = found.emplace_back(objectives.size());
     for (std::size_t i = 0; i < objectives.size() && !reasons.empty(); ++i) {
-      for (const std::size_t measure : objectives[i].measures) {
-        if (row[i].empty()) row[i] = reasons.at(measure);
+      for (const MeasureTerm& term : objectives[i].measures) {
+        if (row[i].empty()) row[i] = reasons.at(term.index);
       }
     }
   }

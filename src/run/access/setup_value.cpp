@@ -100,9 +100,14 @@ Converted convertList(const KdxKeyword& keyword) {
   return SetupValue(std::move(list));
 }
 
-/// Accepts any number; the range of the keyword is checked later.
+bool hasNumbers(std::span<const CodeName> codes) {
+  return std::any_of(codes.begin(), codes.end(), [](const CodeName& code) { return code.code.has_value(); });
+}
+
+/// Accepts any number if values have numbers; the range of the keyword is checked later.
 Converted convertCode(std::span<const CodeName> codes, const KdxValue& value) {
-  if (const auto* integer = std::get_if<std::int32_t>(&value.value)) return SetupValue(*integer);
+  const auto* integer = std::get_if<std::int32_t>(&value.value);
+  if (integer != nullptr && hasNumbers(codes)) return SetupValue(*integer);
   const auto* text = std::get_if<std::string>(&value.value);
   const std::string_view name = text == nullptr ? std::string_view{} : trim(*text);
   for (const CodeName& code : codes) {
@@ -149,6 +154,7 @@ std::string inQuotes(std::string_view text) {
 std::string wantedCode(std::span<const CodeName> codes) {
   std::string names;
   for (const CodeName& code : codes) names += fmt::format("{}'{}'", names.empty() ? "" : ", ", code.name);
+  if (!hasNumbers(codes)) return "one of the names " + names;
   return fmt::format("{} or one of the names {}", wanted(KeywordType::code), names);
 }
 

@@ -252,13 +252,35 @@ const SettingSection<OutputMeasure>& measureSection() {
              .codes = statisticNames(),
              .refusal = "Error: Statistic type invalid for output measure ",
              .meaning = "Of the weighted differences simulated minus observed: 0 mean, 1 root mean square, 2 standard "
-                        "deviation; weighted difference of 3 the largest, 4 the smallest values."}),
+                        "deviation; weighted difference of 3 the largest, 4 the smallest values. Without a number: a "
+                        "criterion of the pairs, of which the objective function gets what it lacks to its best "
+                        "value, such as 1 - NSE."}),
+        checked<Measure>(choice<Measure>(
+                             [](Measure& measure, const SetupValue& value) {
+                               measure.transformation = findTransformation(std::get<std::string>(value)).value();
+                             },
+                             {.name = "Transformation",
+                              .defaultValue = "'none'",
+                              .codes = kValueTransformationNames,
+                              .meaning = "Of simulated and observed values before the statistic is computed."}),
+                         [](const Measure& measure) { return validateValueTransformation(measure); }),
+        setting<&Measure::epsilon>({.name = "Epsilon",
+                                    .defaultValue = kNoDefault,
+                                    .range = kNonNegative,
+                                    .refusal = "Error: Epsilon invalid for output measure ",
+                                    .unit = "of the series",
+                                    .meaning = "Added to the values before a logarithm, an inverse or a power is "
+                                               "taken. Without it, a hundredth of the mean of the observations."}),
+        setting<&Measure::boxCoxLambda>({.name = "Box_Cox_Lambda",
+                                         .defaultValue = "0.25",
+                                         .meaning = "Exponent of the Box-Cox transformation; 0: the logarithm."}),
         // Deliberately the same text for both weights; the location below it shows which one is meant.
         setting<&Measure::weight>({.name = "Weight",
                                    .defaultValue = "1.0",
                                    .range = kNonNegative,
                                    .refusal = "Error: Weight invalid for output measure ",
-                                   .meaning = "Weight of differences at or below 0."}),
+                                   .meaning = "Weight of differences at or below 0; of what a statistic without a "
+                                              "number contributes to the objective function."}),
         setting<&Measure::weightAbove>({.name = "Weight_Above",
                                         .defaultValue = "1.0",
                                         .range = kNonNegative,

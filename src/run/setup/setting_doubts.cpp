@@ -83,13 +83,37 @@ bool hasOneValue(const ModelParameter& parameter) {
   return onGrid(parameter, parameter.upperBound) <= parameter.lowerBound;
 }
 
+void warnOfStatistic(const OutputMeasure& measure, const SetupSection& section) {
+  const Statistic& statistic = statisticOf(measure.statisticType);
+  if (statistic.key.code) {
+    if (measure.weight == 0.0 && measure.weightAbove == 0.0) {
+      section.warn("Weight", "both weights are 0, the measure does not depend on the model");
+    }
+  } else {
+    if (measure.weight == 0.0) section.warn("Weight", "the measure contributes nothing to its objective function");
+    if (section.isWritten("Weight_Above") && measure.weightAbove != measure.weight) {
+      section.warn("Weight_Above",
+                   fmt::format("has no effect with the statistic '{}', which does not weigh differences: "
+                               "Weight multiplies what it contributes to the objective function",
+                               statistic.key.name));
+    }
+  }
+  const ValueTransformation used = transformationOf(measure);
+  const bool usesEpsilon = statistic.usesEpsilon || used == ValueTransformation::logarithm ||
+                           used == ValueTransformation::inverse || used == ValueTransformation::boxCox;
+  if (!usesEpsilon && section.isWritten("Epsilon")) {
+    section.warn("Epsilon", "has no effect, as the measure takes no logarithm, inverse or power");
+  }
+  if (used != ValueTransformation::boxCox && section.isWritten("Box_Cox_Lambda")) {
+    section.warn("Box_Cox_Lambda", "has no effect without Transformation = 'Box-Cox'");
+  }
+}
+
 void warnOfMeasures(const RunConfig& config, const SectionsRead& sections) {
   for (std::size_t i = 0; i < config.measures.size(); ++i) {
     const OutputMeasure& measure = config.measures[i];
     if (measure.interfaceType != InterfaceType::timeSeries) continue;
-    if (measure.weight == 0.0 && measure.weightAbove == 0.0) {
-      sections.measures[i].warn("Weight", "both weights are 0, the measure does not depend on the model");
-    }
+    warnOfStatistic(measure, sections.measures[i]);
     if (isSameFile(measure.simulation.fileName, measure.observation.fileName)) {
       sections.measures[i].warn("Name",
                                 "the observed series is in the file of the simulated one, which the model writes");
@@ -119,14 +143,15 @@ void warnOfSearch(const RunConfig& config, const SectionsRead& sections) {
                              "makes every aggregate 0: the search cannot tell one set from another");
   }
   for (std::size_t i = 0; i < config.objectives.size(); ++i) {
-    for (const std::size_t measure : config.objectives[i].measures) {
-      if (!rewardsTooLittle(config, config.objectives[i], config.measures[measure])) continue;
+    for (const MeasureTerm& term : config.objectives[i].measures) {
+      const OutputMeasure& measure = config.measures[term.index];
+      if (!rewardsTooLittle(config, config.objectives[i], measure)) continue;
       sections.objectives[i].warn(
           "Function_Type",
           fmt::format("a sum with a difference that may be negative ({}) is the smaller the further the simulation is "
                       "below the observation, and the search looks for the smallest: absolute values or squares are "
                       "meant for differences",
-                      quotedForMessage(config.measures[measure].name)));
+                      quotedForMessage(measure.name)));
       break;
     }
   }

@@ -311,7 +311,7 @@ void SetupReader::connectMeasures() {
                       nearest ? fmt::format(", did you mean {}?", quotedForMessage(*nearest)) : ""));
     }
     // cppcheck-suppress derefInvalidIteratorRedundantCheck ; refuse() does not return
-    config_.objectives[found->second].measures.push_back(i);
+    config_.objectives[found->second].measures.emplace_back(i, measure);
   }
   for (std::size_t i = 0; i < config_.objectives.size(); ++i) {
     if (!config_.objectives[i].measures.empty()) continue;

@@ -12,6 +12,12 @@
 namespace mirevo {
 namespace {
 
+/// Statistics that do not weigh differences have one weight, and a best value that is not always 0.
+std::string weightText(const OutputMeasure& measure) {
+  if (!isCriterion(measure)) return fmt::format("weight {} (above {})", measure.weight, measure.weightAbove);
+  return fmt::format("best {}, weight {}", bestValue(measure), measure.weight);
+}
+
 /// Writes the summary line by line.
 class Summary final {
  public:
@@ -46,8 +52,8 @@ class Summary final {
     line("Evaluation period: {} to {}", formatDate(config_.period.start), formatDate(config_.period.end));
     line("Output measures: {}", config_.measures.size());
     for (const OutputMeasure& measure : config_.measures) {
-      line("  {}: {}, weight {} (above {}), objective function {}", measure.name, statisticName(measure),
-           measure.weight, measure.weightAbove, measure.functionName.empty() ? "none" : measure.functionName);
+      line("  {}: {}, {}, objective function {}", measure.name, statisticName(measure), weightText(measure),
+           measure.functionName.empty() ? "none" : measure.functionName);
     }
     line("Objective functions: {}", config_.objectives.size());
     for (const ObjectiveFunction& function : config_.objectives) {
@@ -78,9 +84,9 @@ class Summary final {
 
 }  // namespace
 
-std::string_view statisticName(const OutputMeasure& measure) {
+std::string statisticName(const OutputMeasure& measure) {
   if (measure.interfaceType == InterfaceType::measureFile) return "written by the model";
-  return statisticOf(measure.statisticType).description;
+  return describeStatistic(measure);
 }
 
 std::string setupSummary(const RunConfig& config, const SearchSpace& space, std::span<const int> evaluationOrder) {

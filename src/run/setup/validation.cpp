@@ -8,6 +8,7 @@
 #include "common/fatal_error.h"
 #include "common/text.h"
 #include "measures/dates.h"
+#include "measures/statistics.h"
 
 namespace mirevo {
 namespace {
@@ -86,6 +87,16 @@ std::optional<SettingRefusal> validateMeasurementNumber(const OutputMeasure& mea
   if (measure.interfaceType != InterfaceType::measureFile || measure.measurementNo >= 1) return std::nullopt;
   return SettingRefusal{"Error: Measurement No. invalid for output measure " + measure.name, "MeasurementNo",
                         fmt::format("expected 1 or more, found {}", measure.measurementNo)};
+}
+
+std::optional<SettingRefusal> validateValueTransformation(const OutputMeasure& measure) {
+  const Statistic& statistic = statisticOf(measure.statisticType);
+  const bool hasOwn = statistic.transformation != ValueTransformation::none;
+  if (measure.transformation == ValueTransformation::none || (!hasOwn && !statistic.needsPeaks)) return std::nullopt;
+  return SettingRefusal{"Error: Transformation invalid for output measure " + measure.name, "Transformation",
+                        fmt::format("the statistic '{}' {}", statistic.key.name,
+                                    hasOwn ? "has a transformation of its own"
+                                           : "is that of extremes, use 'peak error' or a bias instead")};
 }
 
 std::optional<SettingRefusal> validateObjectiveFunction(const ObjectiveFunction& function, NamesUsed& names) {

@@ -26,6 +26,8 @@ std::optional<SettingRefusal> validateEquations(const InternalConstraint& constr
 std::optional<SettingRefusal> validateEvaluationPeriod(const EvaluationPeriod& period);
 /// Checks the number of the value in the output-measure file, for a measure of interface type 1.
 std::optional<SettingRefusal> validateMeasurementNumber(const OutputMeasure& measure);
+/// That the statistic leaves the choice of a transformation to the setup.
+std::optional<SettingRefusal> validateValueTransformation(const OutputMeasure& measure);
 /// Checks that no earlier objective function has the name.
 std::optional<SettingRefusal> validateObjectiveFunction(const ObjectiveFunction& function, NamesUsed& names);
 /// Checks that the scale and location of aggregation methods 1 and 2 are given in the setup or can be determined from

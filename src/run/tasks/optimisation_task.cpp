@@ -11,6 +11,7 @@
 #include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/text.h"
+#include "measures/statistics.h"
 #include "run/access/file_validation.h"
 #include "run/tasks/infeasible_sets.h"
 #include "run/tasks/off_grid.h"
@@ -107,10 +108,23 @@ bool warnOfNoWidth(const TaskContext& context, const SearchSummary& summary, std
   return true;
 }
 
+/// The values of statistics that enter an objective function otherwise than as they are.
+void logCriteria(const TaskContext& context, const EvaluationResult& result) {
+  bool hasAny = false;
+  for (std::size_t i = 0; i < context.measures.size() && i < result.measureValues.size(); ++i) {
+    const OutputMeasure& measure = context.measures[i];
+    if (!isCriterion(measure)) continue;
+    if (!std::exchange(hasAny, true)) context.log.line("Output measures:");
+    context.log.line(fmt::format("   {} = {} ({}, best {})", measure.name, formatReal(result.measureValues[i]),
+                                 describeStatistic(measure), bestValue(measure)));
+  }
+}
+
 void logBestSet(const TaskContext& context, const ParameterSet& best, const EvaluationResult& result) {
   std::vector<std::string> objectives;
   for (const ObjectiveFunction& objective : context.objectives) objectives.push_back(objective.name);
   logValues(context.log, "Best parameter set:", context.space.names, ToModelScale(context.space, best));
+  logCriteria(context, result);
   logValues(context.log, "Objective functions:", objectives, result.objectiveValues);
   context.log.line(fmt::format("Aggregate: {}", formatReal(result.aggregate)));
 }

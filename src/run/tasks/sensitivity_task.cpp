@@ -13,6 +13,7 @@
 #include "evaluation/stored_results.h"
 #include "measures/dates.h"
 #include "measures/period_series.h"
+#include "measures/statistics.h"
 #include "parameters/parameter_model.h"
 #include "run/tasks/analysis_names.h"
 #include "run/tasks/infeasible_sets.h"
@@ -77,7 +78,8 @@ ComparedValues compareSeries(const TaskContext& context, std::span<const Evaluat
     const std::size_t begin = std::exchange(first, first + 2 * count);  // values, then their units
     const bool counts =
         std::any_of(context.objectives.begin(), context.objectives.end(), [&](const ObjectiveFunction& objective) {
-          return std::count(objective.measures.begin(), objective.measures.end(), series.measure) > 0;
+          return std::any_of(objective.measures.begin(), objective.measures.end(),
+                             [&](const MeasureTerm& term) { return term.index == series.measure; });
         });
     const OutputMeasure& measure = measures[series.measure];
     const bool isRepeated = std::any_of(taken.begin(), taken.end(),
@@ -97,7 +99,7 @@ ComparedValues compareSeries(const TaskContext& context, std::span<const Evaluat
     const std::int64_t origin = secondNumber(series.start);
     for (std::size_t t = 0; t < count; ++t) {
       const bool isAbove = results.front().ok() && results.front().simulatedValues[begin + t] > series.values[t];
-      const double weight = isAbove ? measure.weightAbove : measure.weight;
+      const double weight = isAbove && !isCriterion(measure) ? measure.weightAbove : measure.weight;
       compared.observed.push_back(weight == 0.0 ? std::numeric_limits<double>::quiet_NaN() : series.values[t]);
       compared.weights.push_back(weight * weight);
       compared.labels.push_back({measure.name, isoTime(secondAfter(origin, series.days[t]))});
