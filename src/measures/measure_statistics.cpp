@@ -16,6 +16,15 @@
 
 namespace mirevo {
 
+std::string listItems(const TimeSeriesObject& series) {
+  std::string text;
+  constexpr int kMostNames = 20;
+  for (int item = 1; item <= std::min(series.itemCount(), kMostNames); ++item) {
+    text += fmt::format("\n{}: {}", item, series.itemName(item));
+  }
+  return text;
+}
+
 std::string describeSpan(const TimeSeriesObject& series, const std::string& fileName) {
   const std::span<const double> times = series.times();
   return fmt::format("{} begins {} and has {} time steps over {} days", fileName,
@@ -230,10 +239,7 @@ void requireItem(TimeSeriesObject& series, const SeriesReference& reference) {
   if (reference.itemNo < 1 || reference.itemNo > series.itemCount()) {
     std::string detail =
         reference.itemLocation + "the file has " + countText(static_cast<std::size_t>(series.itemCount()), "item");
-    constexpr int kMostNames = 20;
-    for (int item = 1; item <= std::min(series.itemCount(), kMostNames); ++item) {
-      detail += fmt::format("\n{}: {}", item, series.itemName(item));
-    }
+    detail += listItems(series);
     fatalError(withNumber("Error: Item No. % not found in ", reference.itemNo) + name, detail);
   }
   if (!series.getData(reference.itemNo)) fatalError("Error getting data of TS item in " + name, series.lastError());

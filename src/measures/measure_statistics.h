@@ -63,6 +63,8 @@ MeasureStatistics computeMeasureStatistics(const OutputMeasure& measure, const E
 bool hasPairs(const OutputMeasure& measure, const EvaluationPeriod& period, TimeSeriesObject& simulation,
               TimeSeriesObject& observation);
 
+/// For people: the items of a file, each behind a line end; of many the first.
+std::string listItems(const TimeSeriesObject& series);
 /// For people: the time span of a series that has steps, and that an item of an observed one has no value in the
 /// period.
 std::string describeSpan(const TimeSeriesObject& series, const std::string& fileName);

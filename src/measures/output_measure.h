@@ -42,6 +42,7 @@ struct SeriesReference {
   /// not known.
   std::string fileLocation = {};
   std::string itemLocation = {};
+  bool isDefaultItem = false;  ///< the setup does not say which item
 };
 
 /// A comparison of a simulated with an observed series, reduced to one number, or a number that the model wrote.

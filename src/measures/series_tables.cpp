@@ -151,12 +151,14 @@ void SeriesTables::checkItems(std::span<const OutputMeasure> measures, const Eva
     const ObservedSeries observed = readObservedSeries(i, measures[i], period, SeriesPrecision::single, observation(i));
     if (isForRuns) requireObservations(observed, measures[i], period);
     warnOfMarkers(observed, measures[i]);
+    warnOfDefaultItem(observation(i), measures[i].observation, observationNames_[observationIndex_[i]]);
     // Files in the base folder that have no time steps yet tell nothing about their columns.
     if (simulation(i).timeStepCount() < 1) {
       needsPairs_[i] = true;
       continue;
     }
     requireItem(simulation(i), measures[i].simulation);
+    warnOfDefaultItem(simulation(i), measures[i].simulation, simulationNames_[simulationIndex_[i]]);
     needsPairs_[i] = hasPairs(measures[i], period, simulation(i), observation(i));
   }
 }
@@ -184,18 +186,28 @@ void SeriesTables::warnOfMarkers(const ObservedSeries& observed, const OutputMea
   const std::string& name = observationNames_[observationIndex_[observed.measure]];
   const int item = measure.observation.itemNo;
   const auto count = std::count(observed.values.begin(), observed.values.end(), marker);
-  std::string warning = fmt::format(
-      "{}{}: item No. {} ({}) is {} at {} of {} times in the evaluation period, and is compared there; if that marks "
+  const std::string warning = fmt::format(
+      "{}: item No. {} ({}) is {} at {} of {} times in the evaluation period, and is compared there; if that marks "
       "missing values, {}",
-      measure.observation.fileLocation, name, item, observation(observed.measure).itemName(item),
-      static_cast<float>(marker), count, observed.values.size(),
+      name, item, observation(observed.measure).itemName(item), static_cast<float>(marker), count,
+      observed.values.size(),
       isTextSeries(name) ? fmt::format("write \"# missing = {}\" above the header row", static_cast<float>(marker))
                          : "make it the attribute missing_value of the variable");
-  // Measures that compare the same item differ in the location at most.
-  const std::string_view text = std::string_view(warning).substr(measure.observation.fileLocation.size());
+  addWarning(measure.observation.fileLocation, warning);
+}
+
+void SeriesTables::warnOfDefaultItem(const TimeSeriesObject& series, const SeriesReference& reference,
+                                     const std::string& name) {
+  if (!reference.isDefaultItem || series.itemCount() <= 1) return;
+  addWarning(reference.fileLocation,
+             fmt::format("{} has several items, and item No. {} ({}) is compared, as the section has no Item_No:{}",
+                         name, reference.itemNo, series.itemName(reference.itemNo), listItems(series)));
+}
+
+void SeriesTables::addWarning(const std::string& location, const std::string& text) {
   const bool isKnown = std::any_of(warnings_.begin(), warnings_.end(),
-                                   [text](const std::string& other) { return other.ends_with(text); });
-  if (!isKnown) warnings_.push_back(std::move(warning));
+                                   [&text](const std::string& other) { return other.ends_with(text); });
+  if (!isKnown) warnings_.push_back(location + text);
 }
 
 std::optional<std::string> SeriesTables::tryOpenSimulationFiles(std::span<const std::string> paths) {

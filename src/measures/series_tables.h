@@ -61,6 +61,10 @@ class SeriesTables final {
   void requireObservations(const ObservedSeries& observed, const OutputMeasure& measure,
                            const EvaluationPeriod& period);
   /// If observations are a usual marker of missing values that is not marked as one.
+  /// Of a file with several items of which the setup names none.
+  void warnOfDefaultItem(const TimeSeriesObject& series, const SeriesReference& reference, const std::string& name);
+  /// Unless it has been given with another location, as for measures that compare the same item.
+  void addWarning(const std::string& location, const std::string& text);
   void warnOfMarkers(const ObservedSeries& observed, const OutputMeasure& measure);
   void checkItems(std::span<const OutputMeasure> measures, const EvaluationPeriod& period, bool isForRuns);
 

@@ -55,6 +55,17 @@ TEST_F(SeriesTablesTest, ObservationsThatMayBeMarkersOfMissingOnesAreWarnedOf) {
               ElementsAre(HasSubstr("marked.csv: item No. 1 (Q) is -99.99 at 2 of 3 times in the evaluation period")));
 }
 
+TEST_F(SeriesTablesTest, AnItemThatTheSetupDoesNotNameIsWarnedOfInAFileWithSeveral) {
+  folder_.write("rain.csv", "time,P,Q\n2001-01-01,9,1\n");
+  OutputMeasure unnamed = measure("rain.csv", "obs.csv");
+  unnamed.simulation.isDefaultItem = true;
+  unnamed.observation.isDefaultItem = true;
+  EXPECT_THAT(
+      SeriesTables::MirevoTSobjectInit(std::vector{unnamed, measure("rain.csv", "obs.csv")}, kPeriod).warnings(),
+      ElementsAre(HasSubstr("rain.csv has several items, and item No. 1 (P) is compared, as the section has no "
+                            "Item_No:\n1: P\n2: Q")));
+}
+
 TEST_F(SeriesTablesTest, SetupFailuresEndTheRun) {
   folder_.write("bad.csv", "time,Q\n2001-01-01,1,2\n");
   folder_.write("text.csv", "time,Q\n2001-01-01,bad\n");

@@ -263,6 +263,7 @@ void SetupReader::readReference(const SetupSection& section, const SettingSectio
   section.read(keywords, reference);
   reference.fileLocation = section.location("File_Name") + ": File_Name: ";
   reference.itemLocation = section.location("Item_No") + ": Item_No: ";
+  reference.isDefaultItem = !section.isWritten("Item_No");
 }
 
 void SetupReader::readSeries(const SetupSection& section, OutputMeasure& measure) const {
