@@ -59,7 +59,6 @@ TEST_F(SeriesTablesTest, AnItemThatTheSetupDoesNotNameIsWarnedOfInAFileWithSever
   folder_.write("rain.csv", "time,P,Q\n2001-01-01,9,1\n");
   OutputMeasure unnamed = measure("rain.csv", "obs.csv");
   unnamed.simulation.isDefaultItem = true;
-  unnamed.observation.isDefaultItem = true;
   EXPECT_THAT(
       SeriesTables::MirevoTSobjectInit(std::vector{unnamed, measure("rain.csv", "obs.csv")}, kPeriod).warnings(),
       ElementsAre(HasSubstr("rain.csv has several items, and item No. 1 (P) is compared, as the section has no "
