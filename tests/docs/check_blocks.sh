@@ -67,7 +67,7 @@ run_console() {
 # Every section and keyword must be in the reference, in this order of sections; the program must find no fault but
 # that the rest of the setup is missing.
 check_setup() {
-  local path name section wrapped=$1 message
+  local path wrapped=$1 message
   # What the fragment is inside of, from the innermost section outwards.
   for path in $(tr / '\n' <<<"$2" | tac); do wrapped="[$path]"$'\n'$wrapped$'\n'"[/$path]"; done
   [[ $wrapped == *'[MIREVO_PARAMETERS]'* ]] || wrapped='[MIREVO_PARAMETERS]'$'\n'$wrapped$'\n''[/MIREVO_PARAMETERS]'
@@ -127,7 +127,7 @@ for page in "$@"; do
   name=$(tr / - <<<"${page%.md}")
   if [ "$page" = docs/tutorial.md ]; then
     mkdir "$work/$name"
-  else
+  elif grep -q '^ *```console' "$source/$page"; then
     # What the tutorial leaves, and a short calibration under the name that other pages use.
     if [ ! -d "$work/basin" ]; then
       cp -R "$work/docs-tutorial" "$work/basin" || exit 1
@@ -135,6 +135,8 @@ for page in "$@"; do
       (cd "$work/basin" && Mirevo basin.kdx) || exit 1
     fi
     cp -R "$work/basin" "$work/$name"
+  else
+    mkdir "$work/$name"
   fi
   cd "$work/$name" || exit 1
   fence=''

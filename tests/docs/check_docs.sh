@@ -24,6 +24,7 @@ done < <(find "$docs" -name '*.md' | sort)
 literals=$(mktemp)
 trap 'rm -f "$literals"' EXIT
 cat "$1"/src/*/*.{cpp,h} "$1"/src/*/*/*.{cpp,h} 2>/dev/null | tr '\n' ' ' | sed -E 's/" *"//g' >"$literals"
+# shellcheck disable=SC2016
 while read -r message; do
   grep -qF -- "$message" "$literals" || { echo "$docs/troubleshooting.md: the program has no message \"$message\""; bad=1; }
   checked=$((checked + 1))
