@@ -66,6 +66,8 @@ SECTION_PAGES = {
     "SimultaneousSimulations": MODEL_FOLDER,
 }
 KEYWORD_PAGES = {
+    "Option": "docs/README#tasks",
+    "Algorithm_Type": "docs/algorithms/search-comparison",
     "Restart": "docs/restart",
     "FailedRunFolders": "docs/restart#models-that-fail",
     "Report": "docs/report",

@@ -19,13 +19,16 @@ test('a keyword is found from disk, and leads to its row of the reference', asyn
   const { page, complaints } = await open('index.html');
   await page.fill('.sidebar-search', 'Max_No_Evaluations');
   await page.press('.sidebar-search', 'Enter');
-  await page.waitForSelector('#search-results li a');
+  await page.waitForSelector('text=Search finished');
   const hits = await page.$$eval('#search-results li a', (links) => links.map((link) => link.textContent));
   assert.ok(hits.includes('Setup reference') && hits.includes('When a search stops'), hits.join());
 
   await page.click('#search-results li a >> text=When a search stops');
+  await page.waitForURL(/stopping\.html/);
   await page.click('a.keyword >> text=Max_No_Evaluations');
-  assert.match(await page.$eval(':target', (row) => row.closest('tr').textContent), /Budget of the search/);
+  await page.waitForURL(/setup-reference\.html/);
+  const row = await page.waitForSelector('tr:has(:target)', { state: 'attached' });
+  assert.match(await row.textContent(), /Budget of the search/);
   assert.deepEqual(complaints, []);
   await page.context().close();
 });
