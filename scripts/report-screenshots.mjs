@@ -1,11 +1,11 @@
-// node report-screenshots.mjs <report.html> <folder>: pictures of a report's parts, those that it has.
+// node report-screenshots.mjs <report.html> <folder> <name>: pictures of a report's parts, those that it has.
 import { join } from 'node:path';
 import { openBrowser } from '../tests/report/page/browser.mjs';
 
-const [report, folder] = process.argv.slice(2);
+const [report, folder, prefix] = process.argv.slice(2);
 const kPictures = [
-  ['report-series', 'light', '#series'],
-  ['report-dotty', 'dark', '#dotty'],
+  ['series', 'light', '#series'],
+  ['dotty', 'dark', '#dotty'],
 ];
 
 const browser = await openBrowser();
@@ -15,7 +15,7 @@ try {
     if (complaints.length > 0) throw new Error(complaints.join('\n'));
     for (const [name, scheme, part] of kPictures) {
       const element = await page.$(part);
-      if (scheme === colorScheme && element) await element.screenshot({ path: join(folder, `${name}.png`) });
+      if (scheme === colorScheme && element) await element.screenshot({ path: join(folder, `${prefix}-${name}.png`) });
     }
     await page.context().close();
   }

@@ -21,8 +21,10 @@ export async function openBrowser() {
     args: ['--no-sandbox', '--disable-gpu', '--disable-quic', '--no-first-run', '--disable-background-networking', '--disable-component-update', '--disable-sync'],
   });
 
-  /** Opens the report file from disk, offline, and waits until all of its charts are drawn. `complaints` gathers whatever the browser says. */
-  async function openFile(path, { width = 1280, height = 900, ...more } = {}) {
+  const isDrawn = () => document.documentElement.dataset.drawn || document.querySelector('.broken');
+
+  /** Opens the file from disk, offline, and waits until it is ready: until all charts of a report are drawn. `complaints` gathers whatever the browser says. */
+  async function openFile(path, { width = 1280, height = 900, isReady = isDrawn, ...more } = {}) {
     const context = await browser.newContext({ viewport: { width, height }, offline: true, ...more });
     const page = await context.newPage();
     const complaints = [];
@@ -30,7 +32,7 @@ export async function openBrowser() {
     page.on('pageerror', (error) => complaints.push(`error: ${error.message}`));
     page.on('request', (request) => { if (!request.url().startsWith('file:')) complaints.push(`request: ${request.url().slice(0, 100)}`); });
     await page.goto(pathToFileURL(path).href);
-    await page.waitForFunction(() => document.documentElement.dataset.drawn || document.querySelector('.broken'), null, { timeout: 30000 });
+    await page.waitForFunction(isReady, null, { timeout: 30000 });
     return { page, complaints };
   }
 
