@@ -1,5 +1,6 @@
 #include "platform/terminal/terminal.h"
 
+#include <algorithm>
 #include <cstdlib>
 #include <signal.h>
 #include <string>
@@ -8,8 +9,11 @@
 #include <termios.h>
 #include <unistd.h>
 
+#include <fmt/core.h>
+
 #include "common/descriptor_output.h"
 #include "common/text.h"
+#include "platform/signals/signal_state.h"
 
 namespace mirevo {
 namespace {
@@ -32,6 +36,20 @@ sigset_t queuedSignals() {
   ::sigemptyset(&signals);
   for (const int number : {SIGINT, SIGTERM, SIGHUP, SIGQUIT, SIGWINCH, SIGCONT, SIGCHLD}) ::sigaddset(&signals, number);
   return signals;
+}
+
+/// A job in the background must not write over what its user types; without a terminal that controls jobs there is
+/// none.
+bool isInBackground(int terminal) {
+  const pid_t group = ::tcgetpgrp(terminal);
+  return group > 0 && group != ::getpgrp();
+}
+
+/// 80 x 24 if the terminal does not say.
+TerminalScreen::Size sizeOf(int terminal) {
+  winsize window{};
+  if (::ioctl(terminal, TIOCGWINSZ, &window) != 0 || window.ws_col == 0 || window.ws_row == 0) return {};
+  return {window.ws_col, window.ws_row};
 }
 
 }  // namespace
@@ -96,9 +114,32 @@ void TerminalScreen::leave() {
 }
 
 TerminalScreen::Size TerminalScreen::size() {
-  winsize window{};
-  if (::ioctl(STDOUT_FILENO, TIOCGWINSZ, &window) != 0 || window.ws_col == 0 || window.ws_row == 0) return {};
-  return {window.ws_col, window.ws_row};
+  return sizeOf(STDOUT_FILENO);
+}
+
+bool hasLineTerminal() {
+  return ::isatty(STDERR_FILENO) == 1 && knowsControlSequences();
+}
+
+int TerminalLine::columns() {
+  return std::max(1, sizeOf(STDERR_FILENO).columns - 1);
+}
+
+void TerminalLine::show(std::string_view text) {
+  const bool isShown = signalState.liveLineDescriptor == STDERR_FILENO;
+  if ((isShown && text == shown_) || isInBackground(STDERR_FILENO)) return;
+  signalState.liveLineDescriptor = STDERR_FILENO;  // first: a signal that comes now clears the line
+  shown_ = text;
+  writeWhole(STDERR_FILENO, fmt::format("\r{}\x1b[K", text), 0);
+}
+
+void TerminalLine::end(std::string_view text) {
+  signalState.liveLineDescriptor = -1;
+  if (!isInBackground(STDERR_FILENO)) writeWhole(STDERR_FILENO, fmt::format("{}{}\n", kClearLine, text), 0);
+}
+
+void TerminalLine::clear() {
+  if (signalState.liveLineDescriptor.exchange(-1) == STDERR_FILENO) writeWhole(STDERR_FILENO, kClearLine, 0);
 }
 
 SignalQueue::SignalQueue() {
