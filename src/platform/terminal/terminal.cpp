@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cstdlib>
+#include <fcntl.h>
 #include <signal.h>
 #include <string>
 #include <sys/ioctl.h>
@@ -125,21 +126,40 @@ int TerminalLine::columns() {
   return std::max(1, sizeOf(STDERR_FILENO).columns - 1);
 }
 
+/// Opened once more, as standard error itself may be shared with programs that want to wait: a terminal whose
+/// connection hangs accepts part of a line, and the rest of it would stop the run.
+TerminalLine::TerminalLine() : descriptor_(::open("/proc/self/fd/2", O_WRONLY | O_NONBLOCK | O_NOCTTY | O_CLOEXEC)) {}
+
+TerminalLine::~TerminalLine() {
+  clear();
+  if (descriptor_ >= 0) ::close(descriptor_);
+}
+
+/// What a terminal does not accept at once is lost; the next line begins afresh.
+void TerminalLine::write(std::string_view text) const {
+  writeWhole(descriptor_, text, 0);
+}
+
 void TerminalLine::show(std::string_view text) {
-  const bool isShown = signalState.liveLineDescriptor == STDERR_FILENO;
-  if ((isShown && text == shown_) || isInBackground(STDERR_FILENO)) return;
-  signalState.liveLineDescriptor = STDERR_FILENO;  // first: a signal that comes now clears the line
+  const bool isShown = signalState.liveLineDescriptor >= 0;
+  if (descriptor_ < 0) return;
+  if (isInBackground(descriptor_)) {
+    signalState.liveLineDescriptor = -1;  // the shell has gone on below it
+    return;
+  }
+  if (isShown && text == shown_) return;
+  signalState.liveLineDescriptor = descriptor_;  // first: a signal that comes now clears the line
   shown_ = text;
-  writeWhole(STDERR_FILENO, fmt::format("\r{}\x1b[K", text), 0);
+  write(fmt::format("\r{}\x1b[K", text));
 }
 
 void TerminalLine::end(std::string_view text) {
   signalState.liveLineDescriptor = -1;
-  if (!isInBackground(STDERR_FILENO)) writeWhole(STDERR_FILENO, fmt::format("{}{}\n", kClearLine, text), 0);
+  if (descriptor_ >= 0 && !isInBackground(descriptor_)) write(fmt::format("{}{}\n", kClearLine, text));
 }
 
 void TerminalLine::clear() {
-  if (signalState.liveLineDescriptor.exchange(-1) == STDERR_FILENO) writeWhole(STDERR_FILENO, kClearLine, 0);
+  if (signalState.liveLineDescriptor.exchange(-1) >= 0) write(kClearLine);
 }
 
 SignalQueue::SignalQueue() {

@@ -27,8 +27,8 @@ bool hasLineTerminal();
 /// handlers take its place; the next show() puts it below them.
 class TerminalLine final {
  public:
-  TerminalLine() = default;
-  ~TerminalLine() { clear(); }
+  TerminalLine();
+  ~TerminalLine();
   TerminalLine(const TerminalLine&) = delete;
   TerminalLine& operator=(const TerminalLine&) = delete;
 
@@ -42,6 +42,9 @@ class TerminalLine final {
   void clear();
 
  private:
+  void write(std::string_view text) const;
+
+  int descriptor_ = -1;  ///< of the terminal, for writing without ever waiting; -1: nothing is shown
   std::string shown_;
 };
 
