@@ -24,14 +24,16 @@ namespace {
 constexpr std::string_view kUsage = "Usage: mirevo-report kdx-file";
 
 constexpr std::string_view kHelp = R"(
-Writes <setup>_Report.html, a report for the browser, from what the run of the setup has written so far. The run may go
-on meanwhile, may have ended in any way or have been cut off; its files are only read.
+Writes <setup>_Report.html, a report for the browser, from what the run of the
+setup has written so far. The run may go on meanwhile, may have ended in any way
+or have been cut off; its files are only read.
 
   --version   prints the version, and what the program was built with
   --help      prints this text
 
-Exit codes: 0 after a report or an answer, 1 if there is none: the setup is refused, no run of it has written anything,
-the file cannot be written, or the command line is refused.
+Exit codes: 0 after a report or an answer; 1 if there is none: the setup is
+refused, no run of it has written anything, the file cannot be written, or the
+command line is refused.
 )";
 
 int makeReport(const std::string& setupFileName) {

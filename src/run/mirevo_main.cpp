@@ -38,12 +38,14 @@ Calibrates and analyses a simulation model as the setup file (KDX format) says.
   --version        prints the version, and what the program was built with
   --help           prints this text
 
-Of several setup files the last one counts. Written beside it: <setup>.log and the results of every evaluation.
-VOLK_PROGRESS=STDOUT prints the run's messages here; creating the file <setup>._kill_ cancels the run. On a terminal the
-run shows a line about itself, unless VOLK_PROGRESS=NONE.
+Of several setup files the last one counts. Written beside it: <setup>.log and
+the results of every evaluation. VOLK_PROGRESS=STDOUT prints the run's messages
+here; creating the file <setup>._kill_ cancels the run. On a terminal the run
+shows a line about itself, unless VOLK_PROGRESS=NONE.
 
-Exit codes: 0 after a normal termination or an answer, 1 after an error, a cancelled run or a command line that is
-refused, 128 + the signal's number after a signal.
+Exit codes: 0 after a normal termination or an answer; 1 after an error, a
+cancelled run or a command line that is refused; 128 + the signal's number after
+a signal.
 )";
 
 /// Whether an argument is the setup file and no question. A keyword's name is not, where it follows --keyword.

@@ -14,7 +14,8 @@ namespace {
 constexpr std::string_view kUsage = "Usage: mirevo-viewer kdx-file\n";
 
 constexpr std::string_view kHelp = R"(
-Shows how the run of a setup file is going, or how it ended. It may begin before the run and in another terminal.
+Shows how the run of a setup file is going, or how it ended. It may begin before
+the run and in another terminal.
 
   q   cancels the run, after a question
   d   leaves, as does Ctrl-C; the run goes on
@@ -22,8 +23,8 @@ Shows how the run of a setup file is going, or how it ended. It may begin before
   --version   prints the version, and what the program was built with
   --help      prints this text
 
-Exit codes: 0, however the run goes or has ended, and after an answer; 1 if there is no such setup and no run of it, or
-the command line is refused.
+Exit codes: 0, however the run goes or has ended, and after an answer; 1 if
+there is no such setup and no run of it, or the command line is refused.
 )";
 
 /// Whether there is such a setup or a run of it.
