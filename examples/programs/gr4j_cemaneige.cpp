@@ -6,12 +6,19 @@
 #include <exception>
 
 #include "models/model_programs.h"
+#include "tools/program_questions.h"
+
+namespace {
+
+constexpr mirevo::examples::ProgramHelp kHelp = {"gr4j_cemaneige", "PARAMETER_FILE FORCING_CSV SIMULATED_CSV",
+                                                 "GR4J with the CemaNeige snow module: computes the daily discharge of "
+                                                 "a catchment from its parameters and weather."};
+
+}  // namespace
 
 int main(int argc, char** argv) {
-  if (argc != 4) {
-    std::fputs("Usage: gr4j_cemaneige PARAMETER_FILE FORCING_CSV SIMULATED_CSV\n", stderr);
-    return 1;
-  }
+  if (mirevo::examples::answersQuestion(argc, argv, kHelp)) return 0;
+  if (argc != 4) return mirevo::examples::refuseArguments(kHelp);
   try {
     models::runCatchment(argv[1], argv[2], argv[3]);
   } catch (const std::exception& error) {

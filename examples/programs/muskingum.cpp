@@ -6,12 +6,19 @@
 #include <exception>
 
 #include "models/model_programs.h"
+#include "tools/program_questions.h"
+
+namespace {
+
+constexpr mirevo::examples::ProgramHelp kHelp = {
+    "muskingum", "PARAMETER_FILE UPSTREAM_CSV LATERAL_CSV SIMULATED_CSV",
+    "Routes the discharge of an upper gauge, with lateral inflow, to a lower one by the Muskingum method."};
+
+}  // namespace
 
 int main(int argc, char** argv) {
-  if (argc != 5) {
-    std::fputs("Usage: muskingum PARAMETER_FILE UPSTREAM_CSV LATERAL_CSV SIMULATED_CSV\n", stderr);
-    return 1;
-  }
+  if (mirevo::examples::answersQuestion(argc, argv, kHelp)) return 0;
+  if (argc != 5) return mirevo::examples::refuseArguments(kHelp);
   try {
     models::runRiver(argv[1], argv[2], argv[3], argv[4]);
   } catch (const std::exception& error) {

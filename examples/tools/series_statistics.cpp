@@ -22,9 +22,14 @@
 #include "measures/series_tables.h"
 #include "platform/series/time_series_object.h"
 #include "tools/goodness_of_fit.h"
+#include "tools/program_questions.h"
 
 namespace mirevo::examples {
 namespace {
+
+constexpr ProgramHelp kHelp = {
+    "series_statistics", "SIMULATED OBSERVED START END [SIMULATED_ITEM [OBSERVED_ITEM]]",
+    "Prints how well a simulated series fits an observed one from START to END, days such as 1991-01-31."};
 
 /// Reads a day such as 2001-01-31.
 DateRecord parseDay(const std::string& text) {
@@ -93,10 +98,9 @@ void run(int argc, char** argv) {
 }  // namespace mirevo::examples
 
 int main(int argc, char** argv) {
-  if (argc < 5 || argc > 7) {
-    std::fputs("Usage: series_statistics SIMULATED OBSERVED START END [SIMULATED_ITEM [OBSERVED_ITEM]]\n", stderr);
-    return 1;
-  }
+  constexpr auto kHelp = mirevo::examples::kHelp;
+  if (mirevo::examples::answersQuestion(argc, argv, kHelp)) return 0;
+  if (argc < 5 || argc > 7) return mirevo::examples::refuseArguments(kHelp);
   try {
     mirevo::examples::run(argc, argv);
   } catch (const mirevo::FatalError& error) {

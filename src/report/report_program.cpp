@@ -10,8 +10,11 @@
 #include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/run_files.h"
+#include "common/text.h"
 #include "common/version.h"
 #include "platform/terminal/front_end.h"
+#include "platform/terminal/terminal.h"
+#include "report/library_versions.h"
 #include "report/run_report.h"
 #include "run/setup/setup_reader.h"
 
@@ -21,11 +24,16 @@ namespace {
 constexpr std::string_view kUsage = "Usage: mirevo-report kdx-file";
 
 constexpr std::string_view kHelp = R"(
-Writes <setup>_Report.html, a report for the browser, from what the run of the setup has written so far. The run may go
-on meanwhile, may have ended in any way or have been cut off; its files are only read.
+Writes <setup>_Report.html, a report for the browser, from what the run of the
+setup has written so far. The run may go on meanwhile, may have ended in any way
+or have been cut off; its files are only read.
 
-  --version   prints the version
+  --version   prints the version, and what the program was built with
   --help      prints this text
+
+Exit codes: 0 after a report or an answer; 1 if there is none: the setup is
+refused, no run of it has written anything, the file cannot be written, or the
+command line is refused.
 )";
 
 int makeReport(const std::string& setupFileName) {
@@ -47,15 +55,11 @@ int makeReport(const std::string& setupFileName) {
 
 int reportProgram(std::span<const std::string> arguments) {
   const std::string_view argument = arguments.size() == 1 ? std::string_view(arguments.front()) : std::string_view();
-  if (argument == "--help") {
-    fmt::print("{}\n{}", kUsage, kHelp);
-    return 0;
-  }
-  if (argument == "--version") {
-    fmt::print("mirevo-report {}\n", programVersion());
-    return 0;
-  }
+  if (argument == "--help") return writeToOutput(fmt::format("{}\n{}", kUsage, kHelp)) ? 0 : 1;
+  if (argument == "--version") return writeToOutput(versionText("mirevo-report", libraryVersions())) ? 0 : 1;
   if (argument.empty() || argument.starts_with("--")) {
+    if (arguments.size() > 1) showMessage("One setup file at a time, and nothing beside a question");
+    if (!argument.empty()) showMessage("Unknown option " + quotedForMessage(argument));
     showMessage(kUsage);
     return 1;
   }

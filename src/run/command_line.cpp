@@ -1,6 +1,7 @@
 #include "run/command_line.h"
 
 #include <algorithm>
+#include <array>
 #include <cstddef>
 #include <span>
 
@@ -20,6 +21,9 @@ bool isSwitch(std::string_view argument) {
 bool asksForViewer(std::string_view argument) {
   return equalIgnoringCase(argument, "//qmon");
 }
+
+constexpr std::string_view kKeywordQuestion = "--keyword";
+constexpr std::array<std::string_view, 3> kQuestions = {"--help", "--version", kKeywordQuestion};
 
 std::string listOf(std::span<const std::string> arguments) {
   std::string list;
@@ -53,6 +57,32 @@ std::string_view CommandLine::setupFileName() const {
 
 bool CommandLine::wantsProgressViewer() const {
   return std::any_of(arguments_.begin(), arguments_.end(), asksForViewer);
+}
+
+std::vector<std::string> CommandLine::ordinaryArguments() const {
+  std::vector<std::string> ordinary;
+  for (int index = 1; index < countArguments(); ++index) ordinary.emplace_back(getArgument(index));
+  return ordinary;
+}
+
+std::optional<ProgramQuestion> CommandLine::question(const std::function<bool(const std::string&)>& isFile) const {
+  std::vector<std::string> others = ordinaryArguments();
+  if (setupFileName().empty() || isFile(others.back())) return std::nullopt;
+  const auto asked = std::find_if(others.rbegin(), others.rend(), [](const std::string& argument) {
+    return std::find(kQuestions.begin(), kQuestions.end(), argument) != kQuestions.end();
+  });
+  if (asked == others.rend()) return std::nullopt;
+  ProgramQuestion question{*asked, {}, {}};
+  auto after = others.erase(asked.base() - 1);
+  if (question.name == kKeywordQuestion && after != others.end()) {
+    question.keyword = *after;
+    others.erase(after);
+  }
+  if (!others.empty()) {
+    question.ignored.push_back(
+        fmt::format("Ignored: {}; {} is answered, and nothing is run", listOf(others), question.name));
+  }
+  return question;
 }
 
 std::vector<std::string> CommandLine::ignored() const {

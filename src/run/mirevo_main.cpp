@@ -1,19 +1,25 @@
 #include "run/mirevo_main.h"
 
-#include <cstdio>
 #include <cstdlib>
 #include <fcntl.h>
 #include <filesystem>
 #include <memory>
 #include <string>
 #include <unistd.h>
+#include <vector>
 
 #include <fmt/core.h>
+#include <fmt/ranges.h>
 
+#include "common/text.h"
 #include "common/version.h"
 #include "platform/jobs/job_launcher.h"
+#include "platform/jobs/mpi_support.h"
 #include "platform/terminal/front_end.h"
+#include "platform/terminal/terminal.h"
+#include "report/library_versions.h"
 #include "run/run_driver.h"
+#include "run/setup/keyword_help.h"
 #include "run/signal_handlers.h"
 #include "run/stop_run.h"
 #include "viewer/qmon_start.h"
@@ -26,26 +32,58 @@ constexpr std::string_view kUsage = "Usage: Mirevo kdx-file";
 constexpr std::string_view kHelp = R"(
 Calibrates and analyses a simulation model as the setup file (KDX format) says.
 
-  //qmon      shows the run's progress on this terminal
-  --version   prints the version
-  --help      prints this text
+  //qmon           shows the run's progress on this terminal
+  --keyword        names every keyword of a setup, as SECTION/Keyword
+  --keyword NAME   explains a keyword or a section
+  --version        prints the version, and what the program was built with
+  --help           prints this text
 
-Written beside the setup file: <setup>.log and the results of every evaluation. VOLK_PROGRESS=STDOUT prints the run's
-messages here; creating the file <setup>._kill_ cancels the run.
+Of several setup files the last one counts. Written beside it: <setup>.log and
+the results of every evaluation. VOLK_PROGRESS=STDOUT prints the run's messages
+here; creating the file <setup>._kill_ cancels the run. On a terminal the run
+shows a line about itself, unless VOLK_PROGRESS=NONE.
+
+Exit codes: 0 after a normal termination or an answer; 1 after an error, a
+cancelled run or a command line that is refused; 128 + the signal's number after
+a signal.
 )";
 
-/// Whether the argument is a question about the program itself and not the name of a file.
-bool isQuestion(const std::string& argument) {
+/// Whether an argument is the setup file and no question. A keyword's name is not, where it follows --keyword.
+bool isSetup(const std::string& argument) {
   std::error_code ignored;
-  return (argument == "--version" || argument == "--help") && !std::filesystem::exists(argument, ignored);
+  return std::filesystem::exists(argument, ignored) && keywordHelp(argument).empty();
 }
 
-void answerQuestion(const std::string& argument) {
-  if (argument == "--version") {
-    fmt::print("Mirevo {}\n", programVersion());
-  } else {
-    fmt::print("{}\n{}", kUsage, kHelp);
+/// Returns the exit code.
+int answerKeyword(const std::string& name) {
+  if (name.empty()) return writeToOutput(fmt::format("{}\n", fmt::join(keywordNames(), "\n"))) ? 0 : 1;
+  if (const std::string help = keywordHelp(name); !help.empty()) return writeToOutput(help) ? 0 : 1;
+  const std::vector<std::string> like = namesLike(name);
+  showMessage(fmt::format(
+      "No section has the keyword {}{}", quotedForMessage(name),
+      like.empty() ? "; Mirevo --keyword names them all" : fmt::format("; did you mean {}?", fmt::join(like, ", "))));
+  return 1;
+}
+
+/// Returns the exit code.
+int answer(const ProgramQuestion& question) {
+  if (question.name == "--keyword") return answerKeyword(question.keyword);
+  std::string text = fmt::format("{}\n{}", kUsage, kHelp);
+  if (question.name == "--version") {
+    text = fmt::format("{}MPI: {}\n", versionText("Mirevo", libraryVersions()), mpiSupport());
   }
+  return writeToOutput(text) ? 0 : 1;
+}
+
+/// Whether it can only be meant as an option, which would otherwise be taken for the name of a setup.
+bool isUnknownOption(const std::string& argument) {
+  std::error_code ignored;
+  return argument.starts_with("-") && !toLowerAscii(argument).ends_with(".kdx") &&
+         !std::filesystem::exists(argument, ignored) && !std::filesystem::exists(argument + ".kdx", ignored);
+}
+
+void showIgnored(const std::vector<std::string>& sentences) {
+  for (const std::string& sentence : sentences) showMessage(sentence, {}, MessageType::warning);
 }
 
 /// If the caller has closed standard input, output or error, opens them: otherwise the run's files would get these
@@ -68,7 +106,7 @@ void processStart(int argc, char** argv) {
   const std::string setupFileName(commandLine.setupFileName());
   // A job launcher watches the processes that it started, so the run must stay in this one.
   const bool isPartOfJob = launcherRank() >= 0;
-  if (setupFileName.empty() || isQuestion(setupFileName) || isPartOfJob) run();
+  if (setupFileName.empty() || commandLine.question(isSetup) || isUnknownOption(setupFileName) || isPartOfJob) run();
   const auto prepare = [] {
     ::setenv("G48", "QMON", 1);
     installSignalHandlers();
@@ -87,19 +125,18 @@ void runWithFrontEnd(std::string_view environmentSetting, const CommandLine& com
 void mirevoMain(const CommandLine& commandLine) {
   const std::string setupFileName(commandLine.setupFileName());
   const bool answers = launcherRank() <= 0;  // only one process of a job
-  if (setupFileName.empty()) {
-    if (!answers) stopRun(0);  // a launcher that sees this process fail would end the one that answers
+  if (const auto question = commandLine.question(isSetup)) {
+    if (answers) showIgnored(question->ignored);
+    stopRun(answers ? answer(*question) : 0);  // a launcher that sees this process fail would end the one that answers
+  }
+  if (setupFileName.empty() || isUnknownOption(setupFileName)) {
+    if (!answers) stopRun(0);
+    if (!setupFileName.empty()) showMessage("Unknown option " + quotedForMessage(setupFileName));
     showMessage(kUsage);
-    for (const std::string& sentence : commandLine.ignored()) showMessage(sentence, {}, MessageType::warning);
+    showIgnored(commandLine.ignored());
     stopRun(1);
   }
-  if (isQuestion(setupFileName)) {
-    if (answers) answerQuestion(setupFileName);
-    stopRun(0);
-  }
-  if (answers) {
-    for (const std::string& sentence : commandLine.ignored()) showMessage(sentence, {}, MessageType::warning);
-  }
+  if (answers) showIgnored(commandLine.ignored());
   int exitCode = 1;
   std::unique_ptr<Job> job;
   {

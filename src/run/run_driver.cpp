@@ -151,7 +151,12 @@ void RunDriver::openRun(const std::string& setupFileName) {
   const bool leavesEnding =
       std::filesystem::exists(setup.file, ignored) || std::filesystem::exists(terminationLog, ignored);
   const std::string terminationLogProblem = leavesEnding ? openTerminationLog(terminationLog) : std::string();
-  const std::string progressProblems = state_.progress.progressInit(logFile, environmentValue("VOLK_PROGRESS"));
+  const std::string destination = environmentValue("VOLK_PROGRESS");
+  const std::string progressProblems = state_.progress.progressInit(logFile, destination);
+  if (wantsLiveLine(destination)) {
+    liveLine_.emplace();
+    state_.progress.passRecordsTo([this](std::string_view record) { liveLine_->take(record); });
+  }
   state_.progress.progressStart(dateAndTimeWithZone(), hostName(), ::getpid());
   state_.log.passWarningsTo([this](std::string_view text) { state_.progress.writeMessage(text); });
   for (const std::string_view problems :

@@ -21,6 +21,7 @@
 #include "run/run_state.h"
 #include "run/setup/run_config.h"
 #include "run/tasks/task.h"
+#include "viewer/live_line.h"
 
 namespace mirevo {
 
@@ -90,6 +91,7 @@ class RunDriver final {
   std::string whereWarningsAre() const;
   void tellOfWarnings() const;
 
+  std::optional<LiveLine> liveLine_;
   RunState state_;
   FileLock runLock_;      ///< on the files with the setup's name
   FileLock processLock_;  ///< the master's, on the process folders of the job

@@ -36,10 +36,20 @@ struct RecordedEnding {
 RecordedEnding endingOnRequest;
 RecordedEnding endingInCrash;
 
-/// Writes to a terminal or pipe, unless it accepts nothing at present (a stopped terminal).
-void showFromSignal(int descriptor, std::string_view text, std::string_view title) noexcept {
+/// Whether a terminal or pipe accepts anything at present (a stopped terminal does not).
+bool acceptsText(int descriptor) noexcept {
   pollfd ready{descriptor, POLLOUT, 0};
-  if (::poll(&ready, 1, 0) == 1 && (ready.revents & POLLOUT) != 0) writeLineFromSignal(descriptor, text, title);
+  return ::poll(&ready, 1, 0) == 1 && (ready.revents & POLLOUT) != 0;
+}
+
+void showFromSignal(int descriptor, std::string_view text, std::string_view title) noexcept {
+  if (acceptsText(descriptor)) writeLineFromSignal(descriptor, text, title);
+}
+
+void clearLiveLine() noexcept {
+  const int terminal = signalState.liveLineDescriptor.exchange(-1);
+  if (terminal < 0 || !acceptsText(terminal)) return;
+  [[maybe_unused]] const ssize_t written = ::write(terminal, kClearLine.data(), kClearLine.size());
 }
 
 bool isRequest(int signalNumber) noexcept {
@@ -63,6 +73,7 @@ bool isRequest(int signalNumber) noexcept {
     writeLineFromSignal(records, message, progress::kEndedRecord);
     writeLineFromSignal(records, progress::kCompleteRecord);
   }
+  clearLiveLine();
   if (signalState.showsMessageBox) {
     showFromSignal(STDERR_FILENO, message, {boxTitle.data(), boxTitleLength});
   } else if (signalState.writesStandardOutput) {

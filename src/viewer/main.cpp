@@ -6,6 +6,7 @@
 
 #include "common/run_files.h"
 #include "common/version.h"
+#include "platform/terminal/terminal.h"
 #include "viewer/viewer.h"
 
 namespace {
@@ -13,37 +14,42 @@ namespace {
 constexpr std::string_view kUsage = "Usage: mirevo-viewer kdx-file\n";
 
 constexpr std::string_view kHelp = R"(
-Shows how the run of a setup file is going, or how it ended. It may begin before the run and in another terminal.
+Shows how the run of a setup file is going, or how it ended. It may begin before
+the run and in another terminal.
 
   q   cancels the run, after a question
   d   leaves, as does Ctrl-C; the run goes on
 
-  --version   prints the version
+  --version   prints the version, and what the program was built with
   --help      prints this text
+
+Exit codes: 0, however the run goes or has ended, and after an answer; 1 if
+there is no such setup and no run of it, or the command line is refused.
 )";
+
+/// Whether there is such a setup or a run of it.
+bool isKnown(const std::string& argument) {
+  const std::string baseName = mirevo::baseNameOfSetup(argument);
+  for (const std::string& path :
+       {baseName + ".kdx", mirevo::runFilePath(baseName, mirevo::run_files::kMessages), baseName}) {
+    if (::access(path.c_str(), F_OK) == 0) return true;
+  }
+  return false;
+}
 
 }  // namespace
 
 int main(int argc, char** argv) {
   const std::string argument = argc == 2 ? argv[1] : "";
-  if (argument == "--help") {
-    fmt::print("{}{}", kUsage, kHelp);
-    return 0;
-  }
-  if (argument == "--version") {
-    fmt::print("mirevo-viewer {}\n", mirevo::programVersion());
-    return 0;
-  }
-  if (argument.empty()) {
+  if (argument == "--help") return mirevo::writeToOutput(std::string(kUsage).append(kHelp)) ? 0 : 1;
+  if (argument == "--version") return mirevo::writeToOutput(mirevo::versionText("mirevo-viewer")) ? 0 : 1;
+  if (argument.empty() || (argument.starts_with("--") && !isKnown(argument))) {
+    if (argc > 2) fmt::print(stderr, "mirevo-viewer: One setup file at a time, and nothing beside a question\n");
+    if (!argument.empty()) fmt::print(stderr, "mirevo-viewer: Unknown option {}\n", argument);
     fmt::print(stderr, "{}", kUsage);
     return 1;
   }
-  const std::string baseName = mirevo::baseNameOfSetup(argument);
-  bool isKnown = false;
-  for (const std::string& path :
-       {baseName + ".kdx", mirevo::runFilePath(baseName, mirevo::run_files::kMessages), baseName})
-    isKnown = isKnown || ::access(path.c_str(), F_OK) == 0;
-  if (!isKnown) {
+  if (!isKnown(argument)) {
     fmt::print(stderr, "mirevo-viewer: {}: there is no such setup and no run of it\n", argument);
     return 1;
   }

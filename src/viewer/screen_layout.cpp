@@ -24,15 +24,21 @@ struct Fact {
   std::string value;
 };
 
-/// "4 of 40, 1 failed", or with the noun: "4 of 40 evaluations, 1 failed".
-std::string evaluationsText(const ProgressState& state, bool withNoun = false) {
-  if (state.countLabel.empty()) return "none yet";
+/// "4 of 40", or with the noun: "4 of 40 evaluations".
+std::string doneText(const ProgressState& state, std::string_view noun) {
   std::string text = fmt::format("{}", state.done);
   // The count in the message file may exceed the plan.
   const bool isBeyondPlan = state.planned && state.done > *state.planned;
   if (state.planned && !isBeyondPlan) text += fmt::format(" of {}", *state.planned);
-  if (withNoun) text += text == "1" || text == "1 of 1" ? " evaluation" : " evaluations";
+  if (!noun.empty()) text += fmt::format(" {}{}", noun, text == "1" || text == "1 of 1" ? "" : "s");
   if (isBeyondPlan) text += fmt::format(" ({} planned)", *state.planned);
+  return text;
+}
+
+/// "4 of 40, 1 failed", or with the noun: "4 of 40 evaluations, 1 failed".
+std::string evaluationsText(const ProgressState& state, std::string_view noun = {}) {
+  if (state.countLabel.empty()) return "none yet";
+  std::string text = doneText(state, noun);
   if (state.failed > 0) text += fmt::format(", {} failed", state.failed);
   return text;
 }
@@ -252,7 +258,7 @@ std::vector<ScreenLine> layoutScreen(const ProgressState& state, const ViewerSit
 }
 
 std::string progressLine(const ProgressState& state, const ViewerSituation& situation) {
-  std::string line = evaluationsText(state, true);
+  std::string line = evaluationsText(state, "evaluation");
   if (const auto percent = percentReached(state)) line += fmt::format(", {:.1f} %", *percent);
   if (state.best) line += ", best so far " + bestText(state, situation.now, false);
   if (state.perSecond) line += ", " + speedText(*state.perSecond);
@@ -260,6 +266,18 @@ std::string progressLine(const ProgressState& state, const ViewerSituation& situ
     line += ", " + timeLeftText(state, situation) + " left";
   }
   return line;
+}
+
+std::string liveLine(const ProgressState& state, const ViewerSituation& situation, int width, CharacterSet characters) {
+  const std::string elapsed = state.origin.startedAt ? runningForText(state, situation) + ": " : std::string();
+  if (state.countLabel.empty()) return fitted(elapsed + printable(state.task, characters), width, characters);
+  const std::string runs = doneText(state, "run");
+  const std::string withFailed = evaluationsText(state, "run");
+  const std::string best = state.best ? ", best " + shortNumber(state.best->aggregate) : std::string();
+  const bool isTimeKnown = situation.presence == RunPresence::running && state.secondsLeft;
+  const std::string left = isTimeKnown ? ", " + timeLeftText(state, situation) + " left" : std::string();
+  const std::string core = withFailed + best;
+  return fitted(firstThatFits({elapsed + core + left, core + left, core, withFailed, runs}, width), width, characters);
 }
 
 }  // namespace mirevo

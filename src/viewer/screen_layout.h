@@ -55,6 +55,10 @@ std::vector<ScreenLine> layoutScreen(const ProgressState& state, const ViewerSit
 /// The same in one line, for an output that is not a screen.
 std::string progressLine(const ProgressState& state, const ViewerSituation& situation);
 
+/// The most important of it in at most `width` columns, for the line that a run shows of itself: time elapsed, runs,
+/// the best, and the time left where it is known. Where there is little room whole facts are left out.
+std::string liveLine(const ProgressState& state, const ViewerSituation& situation, int width, CharacterSet characters);
+
 /// How the run ended, or that it is gone; empty otherwise.
 std::string outcomeText(const ProgressState& state, const ViewerSituation& situation);
 

@@ -30,6 +30,39 @@ TEST(CommandLine, QuestionsAboutAProgramAreAnsweredAndLeaveNoFile) {
   }
 }
 
+TEST(CommandLine, QuestionsAreAnsweredUnlessTheLastArgumentIsAFile) {
+  const TemporaryFolder folder;
+  folder.write("Title", "");
+  folder.write("--version", "");
+  struct Case {
+    const char* arguments;
+    int exitCode;
+    const char* output;
+    const char* error;
+  };
+  const Case cases[] = {
+      {"--version", 1, "", "Error: "},  // a setup file of that name
+      {"--version --help", 0, "Usage: ", "Mirevo: Ignored: \"--version\"; --help is answered"},
+      {"--help none.kdx", 0, "Usage: ", "Mirevo: Ignored: \"none.kdx\"; --help is answered"},
+      {"--keyword", 0, "MIREVO_SIMULATION_OPTION/Option\n", ""},
+      {"--keyword title //x", 0, "MIREVO_SIMULATION_OPTION/Title\n  Meaning: ", ""},
+      {"--keyword Title", 0, "MIREVO_SIMULATION_OPTION/Title\n  Meaning: ", ""},
+      {"--keyword maxno", 1, "", "did you mean OPTIMISATION_ALGORITHM/STOPPING_CRITERIA/Max_No_Evaluations"},
+      {"--keywrd", 1, "", "Mirevo: Unknown option \"--keywrd\"\nMirevo: Usage: "},
+  };
+  for (const Case& each : cases) {
+    const std::string command = fmt::format("cd '{}' && exec '{}' {}", folder.path(), MIREVO_PROGRAM, each.arguments);
+    const ProgramResult result = RunningProgram({"-c", command}, {}, "sh").wait();
+    EXPECT_EQ(result.exitCode, each.exitCode) << each.arguments;
+    EXPECT_THAT(result.output, StartsWith(each.output));
+    EXPECT_THAT(result.error, HasSubstr(each.error));
+    for (const char* left : {"--version.log", "--version._spi_", "--version_Termination.log"}) {
+      std::filesystem::remove(folder / left);  // of the run that is refused
+    }
+    EXPECT_EQ(std::distance(std::filesystem::directory_iterator(folder.path()), {}), 2) << each.arguments;
+  }
+}
+
 TEST(CommandLine, ARefusedSetupLeavesOneLogAndKeepsThoseOfRuns) {
   const ModelFolder folder;
   const std::string setup = folder.writeSetup({.option = 0});

@@ -194,6 +194,37 @@ TEST_F(ViewerTest, WithoutATerminalTheMessagesComeAsLines) {
   EXPECT_THAT(folder_.read("basin.log"), HasSubstr("Termination request"));
 }
 
+TEST_F(ViewerTest, OnATerminalARunWithoutAViewerShowsOneLineThatMessagesReplace) {
+  TerminalProgram slow(
+      {MIREVO_PROGRAM, folder_.writeSetup({.maxEvaluations = 2, .modelArguments = "--sleep-ms 9000"})});
+  EXPECT_TRUE(slow.shows("\r2 s: 0 of 3 runs\x1b[K"));  // time goes on during a model run
+  slow.resize(12, 24);
+  EXPECT_TRUE(slow.shows("\r0 of 3 runs\x1b[K") || slow.shows("\r0 of 3 r...\x1b[K"));
+  slow.type("\x03");
+  EXPECT_EQ(slow.wait(), 128 + SIGINT);
+  EXPECT_THAT(slow.output(), EndsWith("\r\x1b[KMirevo: Control-C send\r\n"));
+
+  TerminalProgram good({MIREVO_PROGRAM, folder_.writeSetup({.maxEvaluations = 5})}, {{"NO_COLOR", ""}});
+  EXPECT_EQ(good.wait(), 0);
+  EXPECT_THAT(good.output(), ::testing::ContainsRegex("\r.\\[K[0-9] s: 6 of 6 runs, best [0-9.e-]+\r\n$"));
+
+  TerminalProgram bad({MIREVO_PROGRAM, folder_.writeSetup({.modelArguments = "--fail-above 0"})});
+  EXPECT_EQ(bad.wait(), 1);
+  EXPECT_THAT(bad.output(), HasSubstr("\x1b[K\r\x1b[KMirevo: Error: Unable to continue. No of failed"));
+  EXPECT_THAT(bad.output(), ::testing::ContainsRegex("\r.\\[K[0-9] s: [0-9]+ of 41 runs, [0-9]+ failed\r\n"));
+
+  const std::string setup = folder_.writeSetup({.maxEvaluations = 2});
+  for (const auto& [name, value] :
+       RunningProgram::Environment{{"TERM", "dumb"}, {"VOLK_PROGRESS", "NONE"}, {"BUILDMODE", "NIGHT"}}) {
+    TerminalProgram quiet({MIREVO_PROGRAM, setup}, {{name, value}});
+    EXPECT_EQ(quiet.wait(), 0);
+    EXPECT_EQ(quiet.output(), "") << name;
+  }
+  TerminalProgram messages({MIREVO_PROGRAM, setup}, {{"VOLK_PROGRESS", "STDOUT"}});
+  EXPECT_EQ(messages.wait(), 0);
+  EXPECT_THAT(messages.output(), AllOf(HasSubstr(" completed: OK"), Not(HasSubstr("\x1b"))));
+}
+
 TEST_F(ViewerTest, WithoutASetupItSaysSo) {
   TerminalProgram none({MIREVO_VIEWER});
   EXPECT_EQ(none.wait(), 1);

@@ -33,6 +33,34 @@ TEST(CommandLine, SwitchesAreNotCountedAndTheLastOrdinaryArgumentWins) {
   }
 }
 
+TEST(CommandLine, TheLastQuestionCountsUnlessTheLastArgumentIsAFile) {
+  using Arguments = std::vector<std::string>;
+  const std::tuple<Arguments, std::string_view, std::string_view, const char*> cases[] = {
+      {{"--help"}, "--help", "", ""},
+      {{"--help", "a.kdx"}, "", "", ""},
+      {{"--help", "b.kdx"}, "--help", "", "Ignored: \"b.kdx\"; --help is answered, and nothing is run"},
+      {{"x", "--keyword", "//y"}, "--keyword", "", "Ignored: \"x\"; --keyword is answered, and nothing is run"},
+      {{"--keyword", "Title"}, "--keyword", "Title", ""},
+      {{"--keyword", "--version"},
+       "--version",
+       "",
+       "Ignored: \"--keyword\"; --version is answered, and nothing is run"},
+      {{"--keyword", "a.kdx"}, "", "", ""},
+      {{"--help", " "}, "", "", ""},
+      {{"help"}, "", "", ""},
+      {{}, "", "", ""},
+  };
+  for (const auto& [arguments, name, keyword, ignored] : cases) {
+    const auto question = CommandLine(arguments).question([](const std::string& file) { return file == "a.kdx"; });
+    SCOPED_TRACE(arguments.empty() ? "no argument" : arguments.back());
+    ASSERT_EQ(question.has_value(), !name.empty());
+    if (!question) continue;
+    EXPECT_EQ(question->name, name);
+    EXPECT_EQ(question->keyword, keyword);
+    EXPECT_EQ(question->ignored, ignored[0] == '\0' ? Arguments{} : Arguments{ignored});
+  }
+}
+
 TEST(CommandLine, WhatHasNoEffectIsNamed) {
   const std::pair<std::vector<std::string>, const char*> cases[] = {
       {{"a.kdx", "//QMON"}, ""},

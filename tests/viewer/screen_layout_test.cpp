@@ -148,6 +148,14 @@ TEST(ScreenLayout, TheLastLineAsksTellsAndOffersKeys) {
   situation = situationOf();
   situation.problem = "Unable to cancel: Permission denied";
   EXPECT_EQ(layoutScreen(stateOf(), situation, {80, 10}, CharacterSet::utf8).back().text, situation.problem);
+  for (const auto& [width, line] : {std::pair{79, "2 h: 4 of 40 runs, 1 failed, best 2, 59 min 50 s left"},
+                                    {50, "4 of 40 runs, 1 failed, best 2, 59 min 50 s left"},
+                                    {40, "4 of 40 runs, 1 failed, best 2"},
+                                    {25, "4 of 40 runs, 1 failed"},
+                                    {12, "4 of 40 runs"},
+                                    {10, "4 of 40..."}}) {
+    EXPECT_EQ(liveLine(stateOf(), situationOf(), width, CharacterSet::ascii), line);
+  }
   EXPECT_EQ(progressLine(stateOf(), situationOf()),
             "4 of 40 evaluations, 1 failed, 10.0 %, best so far 2 (No. 4, 1 h ago), 36 an hour, 59 min 50 s left");
 }

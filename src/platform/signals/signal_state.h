@@ -14,6 +14,7 @@ struct SignalState {
   std::atomic<int> resultFileDescriptor{-1};   ///< while rows are written; -1 from the closing lines on
   std::atomic<int> runRecordDescriptor{-1};    ///< until the end of the run is recorded
   std::atomic<int> messageFileDescriptor{-1};  ///< of the progress records
+  std::atomic<int> liveLineDescriptor{-1};     ///< of a terminal whose last line is rewritten in place
   std::atomic<int> heldSteps{0};               ///< number of EndingSignalsHeld objects
   std::atomic<bool> isEnding{false};           ///< a handler has begun to end the run
   /// Ends the model processes; async-signal-safe.
@@ -25,6 +26,9 @@ struct SignalState {
 static_assert(std::atomic<int>::is_always_lock_free && std::atomic<void (*)()>::is_always_lock_free);
 
 inline SignalState signalState;
+
+/// Moves the cursor of a terminal to the beginning of its line, which it empties (ECMA-48).
+inline constexpr std::string_view kClearLine = "\r\x1b[K";
 
 /// Writes `prefix`, `text` and a line end, at most 512 bytes, with one write(2). Async-signal-safe; failures are
 /// ignored.

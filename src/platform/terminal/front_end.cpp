@@ -5,6 +5,7 @@
 #include <unistd.h>
 
 #include "common/descriptor_output.h"
+#include "platform/signals/signal_state.h"
 #include "platform/terminal/terminal.h"
 
 namespace mirevo {
@@ -28,6 +29,7 @@ MessageResult showMessage(std::string_view text, std::string_view title, Message
     shown += "\x1b[0m";
   }
   shown.append(": ").append(text).append("\n");
+  if (signalState.liveLineDescriptor.exchange(-1) >= 0) shown.insert(0, kClearLine);
   return writeWhole(STDERR_FILENO, shown, kPatienceMilliseconds).error == 0 ? MessageResult::ok
                                                                             : MessageResult::notShown;
 }

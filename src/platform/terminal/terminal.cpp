@@ -1,6 +1,8 @@
 #include "platform/terminal/terminal.h"
 
+#include <algorithm>
 #include <cstdlib>
+#include <fcntl.h>
 #include <signal.h>
 #include <string>
 #include <sys/ioctl.h>
@@ -8,8 +10,11 @@
 #include <termios.h>
 #include <unistd.h>
 
+#include <fmt/core.h>
+
 #include "common/descriptor_output.h"
 #include "common/text.h"
+#include "platform/signals/signal_state.h"
 
 namespace mirevo {
 namespace {
@@ -32,6 +37,20 @@ sigset_t queuedSignals() {
   ::sigemptyset(&signals);
   for (const int number : {SIGINT, SIGTERM, SIGHUP, SIGQUIT, SIGWINCH, SIGCONT, SIGCHLD}) ::sigaddset(&signals, number);
   return signals;
+}
+
+/// A job in the background must not write over what its user types; without a terminal that controls jobs there is
+/// none.
+bool isInBackground(int terminal) {
+  const pid_t group = ::tcgetpgrp(terminal);
+  return group > 0 && group != ::getpgrp();
+}
+
+/// 80 x 24 if the terminal does not say.
+TerminalScreen::Size sizeOf(int terminal) {
+  winsize window{};
+  if (::ioctl(terminal, TIOCGWINSZ, &window) != 0 || window.ws_col == 0 || window.ws_row == 0) return {};
+  return {window.ws_col, window.ws_row};
 }
 
 }  // namespace
@@ -96,9 +115,51 @@ void TerminalScreen::leave() {
 }
 
 TerminalScreen::Size TerminalScreen::size() {
-  winsize window{};
-  if (::ioctl(STDOUT_FILENO, TIOCGWINSZ, &window) != 0 || window.ws_col == 0 || window.ws_row == 0) return {};
-  return {window.ws_col, window.ws_row};
+  return sizeOf(STDOUT_FILENO);
+}
+
+bool hasLineTerminal() {
+  return ::isatty(STDERR_FILENO) == 1 && knowsControlSequences();
+}
+
+int TerminalLine::columns() {
+  return std::max(1, sizeOf(STDERR_FILENO).columns - 1);
+}
+
+/// Opened once more, as standard error itself may be shared with programs that want to wait: a terminal whose
+/// connection hangs accepts part of a line, and the rest of it would stop the run.
+TerminalLine::TerminalLine() : descriptor_(::open("/proc/self/fd/2", O_WRONLY | O_NONBLOCK | O_NOCTTY | O_CLOEXEC)) {}
+
+TerminalLine::~TerminalLine() {
+  clear();
+  if (descriptor_ >= 0) ::close(descriptor_);
+}
+
+/// What a terminal does not accept at once is lost; the next line begins afresh.
+void TerminalLine::write(std::string_view text) const {
+  writeWhole(descriptor_, text, 0);
+}
+
+void TerminalLine::show(std::string_view text) {
+  const bool isShown = signalState.liveLineDescriptor >= 0;
+  if (descriptor_ < 0) return;
+  if (isInBackground(descriptor_)) {
+    signalState.liveLineDescriptor = -1;  // the shell has gone on below it
+    return;
+  }
+  if (isShown && text == shown_) return;
+  signalState.liveLineDescriptor = descriptor_;  // first: a signal that comes now clears the line
+  shown_ = text;
+  write(fmt::format("\r{}\x1b[K", text));
+}
+
+void TerminalLine::end(std::string_view text) {
+  signalState.liveLineDescriptor = -1;
+  if (descriptor_ >= 0 && !isInBackground(descriptor_)) write(fmt::format("{}{}\n", kClearLine, text));
+}
+
+void TerminalLine::clear() {
+  if (signalState.liveLineDescriptor.exchange(-1) >= 0) write(kClearLine);
 }
 
 SignalQueue::SignalQueue() {

@@ -2,6 +2,7 @@
 
 #include <csignal>
 #include <memory>
+#include <string>
 #include <string_view>
 
 namespace mirevo {
@@ -18,6 +19,34 @@ bool wantsUtf8();
 
 /// Whether to write in colour to a terminal: NO_COLOR is unset or empty, and TERM is set and not "dumb".
 bool wantsColour();
+
+/// Whether one line of standard error can be rewritten in place: it is a terminal, and TERM is set and not "dumb".
+bool hasLineTerminal();
+
+/// A line of the terminal on standard error that is rewritten in place. Messages of showMessage() and of signal
+/// handlers take its place; the next show() puts it below them.
+class TerminalLine final {
+ public:
+  TerminalLine();
+  ~TerminalLine();
+  TerminalLine(const TerminalLine&) = delete;
+  TerminalLine& operator=(const TerminalLine&) = delete;
+
+  /// Columns that a text may take; the last column of the terminal stays free, so that the line never wraps.
+  static int columns();
+  /// Replaces the line, unless it is shown already. Nothing is shown while this process is in the background or the
+  /// terminal is stopped.
+  void show(std::string_view text);
+  /// Replaces the line by `text`, which stays.
+  void end(std::string_view text);
+  void clear();
+
+ private:
+  void write(std::string_view text) const;
+
+  int descriptor_ = -1;  ///< of the terminal, for writing without ever waiting; -1: nothing is shown
+  std::string shown_;
+};
 
 /// Writes the whole text to standard output; false when its reader has gone.
 bool writeToOutput(std::string_view text);

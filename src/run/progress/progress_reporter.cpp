@@ -80,18 +80,17 @@ std::string ProgressReporter::progressInit(std::string_view runFileName, std::st
 }
 
 void ProgressReporter::writeRecord(std::string_view kind, std::string_view text) {
-  if (messageUnit_ < 0) return;
-  std::string record;
-  if (messageUnit_ == kStandardOutput) {
-    if (kind != progress::kMessage) return;
-    record = " ";  // list-directed output begins with a blank
-  } else {
-    record = kind;
-  }
-  record += withValidUtf8(text);
+  if (messageUnit_ < 0 && !listener_) return;
+  std::string record = std::string(kind) + withValidUtf8(text);
   std::replace_if(
       record.begin(), record.end(), [](char c) { return c == '\n' || c == '\r'; }, ' ');
   record += '\n';
+  if (listener_) listener_(record);
+  if (messageUnit_ < 0) return;
+  if (messageUnit_ == kStandardOutput) {
+    if (kind != progress::kMessage) return;
+    record.replace(0, kind.size(), " ");  // list-directed output begins with a blank
+  }
   if (isLineUnfinished_) record.insert(record.begin(), '\n');
   const int descriptor = messageUnit_ == kStandardOutput ? STDOUT_FILENO : messageUnit_;
   // One write(2), so that a viewer never sees half a record in a file on disk.
@@ -176,6 +175,7 @@ void ProgressReporter::progressEnd(std::string_view ending) {
 }
 
 bool ProgressReporter::isCancelled() {
+  if (listener_) listener_({});
   if (!cancelled_) cancelled_ = ::access(runFilePath(baseName_, run_files::kKill).c_str(), F_OK) == 0;
   return cancelled_;
 }

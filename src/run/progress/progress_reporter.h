@@ -25,6 +25,10 @@ class ProgressReporter final {
   /// Returns the problems, one per line; empty when all is well. The run goes on in any case.
   std::string progressInit(std::string_view runFileName, std::string_view destination);
 
+  /// From now on `listener` gets every record as it is in a message file, whether or not one is written, and an empty
+  /// one whenever the run looks for its kill file, so that it can tell the time.
+  void passRecordsTo(std::function<void(std::string_view)> listener) { listener_ = std::move(listener); }
+
   void writeStatus(std::string_view text);
   void writeMessage(std::string_view text);
 
@@ -58,6 +62,7 @@ class ProgressReporter final {
   std::string messageFile() const;
 
   Clock clock_;
+  std::function<void(std::string_view)> listener_;
   std::string baseName_;
   std::string problem_;
   int messageUnit_ = -1;           ///< < 0 nowhere, 0 standard output, > 0 the message file's descriptor

@@ -27,7 +27,36 @@ keyword rows; do not edit it.
 - Unknown sections and keywords are not read; the run log warns of them and names the nearest known one.
 )";
 
-std::string_view typeName(KeywordType type) {
+std::string defaultText(const KeywordRow& row) {
+  if (row.isRequired()) return "required";
+  return row.isLeftOutByDefault() || row.type == KeywordType::textLines ? "none"
+                                                                        : fmt::format("`{}`", row.facts.defaultValue);
+}
+
+std::string codesText(const KeywordRow& row) {
+  std::string text;
+  for (const CodeName& code : row.facts.codes) {
+    if (!text.empty()) text += ", ";
+    text += code.code ? fmt::format("{} `'{}'`", *code.code, code.name) : fmt::format("`'{}'`", code.name);
+  }
+  return text;
+}
+
+std::string keywordTableOf(const SectionRow& section) {
+  std::string text = "| keyword | type | default | valid | unit | meaning |\n|---|---|---|---|---|---|\n";
+  std::string codes;
+  for (const KeywordRow& row : section.keywords) {
+    text += fmt::format("| `{}` | {} | {} | {} | {} | {} |\n", row.name(), keywordTypeName(row.type), defaultText(row),
+                        row.facts.range.text(), row.facts.unit, row.facts.meaning);
+    const bool isFlag = row.facts.codes.data() == std::data(kNoYesNames);
+    if (!row.facts.codes.empty() && !isFlag) codes += fmt::format("- `{}`: {}\n", row.name(), codesText(row));
+  }
+  return codes.empty() ? text : text + "\n" + codes;
+}
+
+}  // namespace
+
+std::string_view keywordTypeName(KeywordType type) {
   switch (type) {
     case KeywordType::integer:
       return "integer";
@@ -51,35 +80,6 @@ std::string_view typeName(KeywordType type) {
   }
   return "";
 }
-
-std::string defaultText(const KeywordRow& row) {
-  if (row.isRequired()) return "required";
-  return row.isLeftOutByDefault() || row.type == KeywordType::textLines ? "none"
-                                                                        : fmt::format("`{}`", row.facts.defaultValue);
-}
-
-std::string codesText(const KeywordRow& row) {
-  std::string text;
-  for (const CodeName& code : row.facts.codes) {
-    if (!text.empty()) text += ", ";
-    text += code.code ? fmt::format("{} `'{}'`", *code.code, code.name) : fmt::format("`'{}'`", code.name);
-  }
-  return text;
-}
-
-std::string keywordTableOf(const SectionRow& section) {
-  std::string text = "| keyword | type | default | valid | unit | meaning |\n|---|---|---|---|---|---|\n";
-  std::string codes;
-  for (const KeywordRow& row : section.keywords) {
-    text += fmt::format("| `{}` | {} | {} | {} | {} | {} |\n", row.name(), typeName(row.type), defaultText(row),
-                        row.facts.range.text(), row.facts.unit, row.facts.meaning);
-    const bool isFlag = row.facts.codes.data() == std::data(kNoYesNames);
-    if (!row.facts.codes.empty() && !isFlag) codes += fmt::format("- `{}`: {}\n", row.name(), codesText(row));
-  }
-  return codes.empty() ? text : text + "\n" + codes;
-}
-
-}  // namespace
 
 std::string setupReference() {
   std::string page = fmt::format(kIntroduction, kSetupTarget, kItemCountKeyword, kFieldWidth);

@@ -7,7 +7,9 @@
 #include <gtest/gtest.h>
 
 #include "common/files.h"
+#include "common/text.h"
 #include "run/access/setup_value.h"
+#include "run/setup/keyword_help.h"
 #include "run/setup/run_keywords.h"
 #include "run/setup/setup_reference.h"
 
@@ -54,6 +56,22 @@ TEST(SetupReference, TheManualSaysWhatTheProgramReads) {
   EXPECT_EQ(readTextFile(path, reason).value_or(reason), setupReference())
       << "a keyword row has changed: MIREVO_WRITE_DOCS=1 build/release/run_tests "
          "--gtest_filter=SetupReference.* writes the page anew";
+}
+
+TEST(KeywordHelp, EveryKeywordIsFoundByItsNameWithMoreOrLessOfItsSection) {
+  for (const std::string& name : keywordNames()) {
+    const std::string help = keywordHelp(name);
+    EXPECT_TRUE(help.starts_with(name + "\n  Meaning: ")) << help;
+    EXPECT_EQ(help.find(']'), std::string::npos) << "a link stays: " << help;
+    for (const std::string_view line : splitLines(help)) EXPECT_LE(line.size(), 80U) << line;
+    const std::string inTwo = name.substr(name.find('/') + 1);
+    EXPECT_NE(("\n" + keywordHelp(toLowerAscii(inTwo))).find("\n" + name + "\n"), std::string::npos) << inTwo;
+  }
+  EXPECT_EQ(keywordHelp("parameter_7/initial_value"), keywordHelp("MODEL_PARAMETERS/PARAMETER_n/Initial_Value"));
+  EXPECT_NE(keywordHelp("Weight").find("\n\n"), std::string::npos) << "two sections have it";
+  EXPECT_TRUE(keywordHelp("STOPPING_CRITERIA").find("STOPPING_CRITERIA/Max_No_Evaluations\n") != std::string::npos);
+  for (const char* unknown : {"", "/", "Value", "SIMPARAM/Title"}) EXPECT_EQ(keywordHelp(unknown), "") << unknown;
+  EXPECT_EQ(namesLike("SIMPARAM/Titel"), std::vector<std::string>{"Title"});
 }
 
 }  // namespace
