@@ -13,10 +13,12 @@ add_custom_command(OUTPUT ${series}
   VERBATIM)
 
 # A simulated series must exist before a run, so the model is run once with its own parameters.
-add_custom_command(OUTPUT ${stage}/model/simulated.csv
+set(simulated ${stage}/model/simulated.csv)
+add_custom_command(OUTPUT ${simulated}
   DEPENDS ${staged} ${series}
   COMMAND ./run.sh
   WORKING_DIRECTORY ${stage}/model
   VERBATIM)
 
-add_custom_target(example_piscataquis ALL DEPENDS ${staged} ${series} ${stage}/model/simulated.csv)
+add_custom_target(example_piscataquis ALL DEPENDS ${staged} ${series} ${simulated})
+install_example(piscataquis)

@@ -22,3 +22,4 @@ add_custom_command(OUTPUT ${simulated}
   VERBATIM)
 
 add_custom_target(example_sitter ALL DEPENDS ${staged} ${series} ${simulated})
+install_example(sitter)

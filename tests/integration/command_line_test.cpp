@@ -128,6 +128,31 @@ TEST(CommandLine, AJobWhoseLauncherIsOfAnotherMpiIsRefusedBeforeAnyFileIsTouched
   }
 }
 
+TEST(CommandLine, AJobWithoutThePartForMpiIsRefusedWithWhatIsMissing) {
+  const ModelFolder folder;
+  const std::string setup = folder.writeSetup({.option = 0, .scenarios = {"5, 2, 1"}});
+  std::filesystem::create_directory(folder / "bin");
+  const std::string program = folder / "bin/Mirevo";
+  std::filesystem::copy_file(MIREVO_PROGRAM, program);
+  const auto start = [&](const RunningProgram::Environment& job) {
+    return RunningProgram({setup}, job, program.c_str()).wait();
+  };
+  // PMIX has no variable for the number of processes.
+  const RunningProgram::Environment jobs[] = {
+      {{"OMPI_COMM_WORLD_SIZE", "4"}}, {{"PMI_SIZE", "4"}}, {{"PMIX_RANK", "0"}}};
+  for (const char* fault : {"mirevo-mpi.so does not exist", "cannot be loaded"}) {
+    for (const auto& job : jobs) {
+      const ProgramResult result = start(job);
+      EXPECT_EQ(result.exitCode, 1);
+      EXPECT_THAT(result.error, AllOf(HasSubstr("cannot take part in this MPI job"), HasSubstr(fault),
+                                      HasSubstr("Install the package mirevo-mpi")));
+      EXPECT_FALSE(folder.exists("basin.log"));
+    }
+    folder.write("bin/lib/mirevo/mirevo-mpi.so", "no module");
+  }
+  EXPECT_EQ(start({{"OMPI_COMM_WORLD_SIZE", "1"}}).exitCode, 0) << "a job of one process needs no MPI";
+}
+
 TEST(Results, WhatIsNotOfARunIsNeitherRenamedNorRemoved) {
   const ModelFolder folder;
   const std::string setup =

@@ -1,5 +1,3 @@
-#include "platform/jobs/mpi_job.h"
-
 #include <algorithm>
 #include <array>
 #include <csignal>
@@ -20,6 +18,7 @@
 #include "common/clock.h"
 #include "common/fatal_error.h"
 #include "platform/jobs/job_launcher.h"
+#include "platform/jobs/mpi_module.h"
 
 namespace mirevo {
 namespace {
@@ -213,14 +212,13 @@ void MpiJob::end(int exitCode) {
 
 }  // namespace
 
-std::unique_ptr<Job> joinMpiJob() {
-  const auto launched = launchedProcessCount();
-  const bool isLaunched = launched || launcherRank() >= 0;
-  if (!isLaunched) return nullptr;  // variables that the user has set for a model's own MPI are kept
-  if (launched && *launched <= 1) {
-    hideJobFromModels();
-    return nullptr;
-  }
+extern "C" {
+
+/// The program refuses a module of another version.
+extern const char mirevoModuleVersion[];
+const char mirevoModuleVersion[] = MIREVO_VERSION;
+
+Job* mirevoJoinMpiJob() {
   // MPI_Finalize spins; several processes may share a core.
   ::setenv("OMPI_MCA_mpi_yield_when_idle", "1", 0);
   int code = MPI_Init(nullptr, nullptr);
@@ -231,16 +229,16 @@ std::unique_ptr<Job> joinMpiJob() {
     code = MPI_Comm_size(MPI_COMM_WORLD, &count);
     if (code == MPI_SUCCESS) code = MPI_Comm_rank(MPI_COMM_WORLD, &rank);
   }
-  std::unique_ptr<MpiJob> job;
-  if (code == MPI_SUCCESS && count > 1) job = std::make_unique<MpiJob>(rank, count);
-  hideJobFromModels();
-  if (job) return job;
+  if (code == MPI_SUCCESS && count > 1) return new MpiJob(rank, count);
   if (code == MPI_SUCCESS) MPI_Finalize();
+  const auto launched = launchedProcessCount();
   if (!launched) return nullptr;
   fatalError("Error: The processes of the job cannot reach each other by MPI",
              fmt::format("A job launcher started {} processes, of which each finds itself alone{}. Start them with the "
                          "mpirun of the MPI that Mirevo is linked with, or with srun --mpi=pmix.",
                          *launched, code == MPI_SUCCESS ? "" : ": " + errorText(code)));
 }
+
+}  // extern "C"
 
 }  // namespace mirevo
