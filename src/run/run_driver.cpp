@@ -241,6 +241,7 @@ void RunDriver::openResults() {
       std::make_unique<RunReporter>(state_, results_->table(), results_->failedRuns(), parameters_->searchSpace(),
                                     results_->simulatedValues(), &results_->pairs(), &results_->unkeptFiles(),
                                     measureSources(config_.measures, config_.measureFile, config_.baseFolder));
+  reporter_->keepSettings(results_->settings());
   openSeries();
   failedRunPolicy_.emplace(config_.plannedEvaluations(), config_.failedRunFolders);
   EarlierEvaluations* const earlier = results_->earlierEvaluations();
@@ -469,6 +470,7 @@ std::optional<RunDriver::Unwritten> RunDriver::closeResults(const Ending& ending
   if (!results_) return std::nullopt;
   std::optional<Unwritten> unwritten;
   std::string reason;
+  if (!results_->settings().putBack(reason)) unwritten = {results_->settings().path(), reason};
   if (!results_->table().finish(lines, reason)) unwritten = {results_->table().path(), reason};
   if (reporter_ && !results_->pairs().finish(reporter_->numbersWithPairs(), reason) && !unwritten) {
     unwritten = {results_->pairs().path(), reason};

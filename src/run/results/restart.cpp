@@ -1,8 +1,10 @@
 #include "run/results/restart.h"
 
 #include <algorithm>
+#include <cerrno>
 #include <iterator>
 #include <span>
+#include <sys/stat.h>
 #include <utility>
 
 #include <fmt/core.h>
@@ -23,6 +25,7 @@ constexpr std::string_view kRefusal = "Error: Unable to continue the earlier run
 constexpr std::string_view kRemedy = "Restart = 0 starts afresh and keeps the earlier results under a numbered name.";
 constexpr std::size_t kMostChangesShown = 20;
 constexpr std::size_t kMostRowsShown = 20;
+constexpr double kSettingsSeconds = 1.0;  ///< between looks whether their file is there
 
 [[noreturn]] void refuse(std::string_view detail) {
   fatalError(kRefusal, fmt::format("{}\n{}", detail, kRemedy));
@@ -202,11 +205,29 @@ int firstWithoutPairs(std::span<const ResultRow> rows, const PairsByNumber& pair
   return isKnown || count == 0 ? 0 : first->number;
 }
 
-void writeRestartSettings(const std::string& path, const RunConfig& config) {
+void RestartSettingsFile::write(const RunConfig& config) {
+  text_ = formatRestartSettings(restartSettings(config));
+  nextLook_ = clock_() + kSettingsSeconds;
   std::string reason;
-  if (!replaceFile(path, formatRestartSettings(restartSettings(config)), reason)) {
-    fatalError("Error: Unable to write to " + path, reason);
-  }
+  if (!replaceFile(path_, text_, reason)) fatalError("Error: Unable to write to " + path_, reason);
+}
+
+std::string RestartSettingsFile::keep() {
+  std::string reason;
+  if (hasFailed_ || text_.empty() || clock_() < nextLook_) return {};
+  nextLook_ = clock_() + kSettingsSeconds;
+  hasFailed_ = !putBack(reason);
+  return hasFailed_ ? fmt::format(
+                          "{} was removed and cannot be written again: {}. Without it the run cannot be "
+                          "continued if it is interrupted",
+                          path_, reason)
+                    : std::string();
+}
+
+bool RestartSettingsFile::putBack(std::string& reason) const {
+  struct stat status {};
+  const bool isMissing = ::lstat(path_.c_str(), &status) != 0 && errno == ENOENT;
+  return text_.empty() || !isMissing || replaceFile(path_, text_, reason);
 }
 
 }  // namespace mirevo

@@ -63,6 +63,7 @@ RunResults::RunResults(const RunConfig& config, const SearchSpace& space, const 
       columns_(resultColumns(config, space)),
       names_(namesOf(config)),
       files_(restartFiles(filePrefix, names_)),
+      settings_(files_.settings),
       table_(files_.checksums, tableHead_),
       failedRuns_({pathBeside(filePrefix, run_files::kFailedRuns), files_.failures}, config.setupName, space.names,
                   tableHead_),
@@ -198,7 +199,7 @@ void RunResults::keepEarlierFiles(const RunConfig& config, RunLog& log) const {
 void RunResults::startAfresh(const RunConfig& config, RunLog& log) {
   keepEarlierFiles(config, log);
   // Before there is a result, so that none is ever without the settings that it depends on.
-  writeRestartSettings(files_.settings, config);
+  settings_.write(config);
   if (simulatedValues_) simulatedValues_->create();
   RunRecord record = recordOf(config, log);
   record.started = dateAndTimeNow();
@@ -274,7 +275,7 @@ void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggreg
   const std::string failedFolders = runFilePath(processFolderPrefix(config), run_files::kFailedFolder);
   for (const std::string& problem : removeFailedRunFolders(failedFolders, failed)) log.warning(problem);
   // With a raised budget in it, rows that the smaller one had ended would be taken for the search's.
-  writeRestartSettings(files_.settings, config);
+  settings_.write(config);
   for (const std::string& note : run.notes) log.line(note);
   if (earlier.unknown > 0) {
     log.line(fmt::format("Restart: why evaluations failed is not known any more of {}: {} does not say it",

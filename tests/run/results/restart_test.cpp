@@ -100,6 +100,24 @@ TEST_F(RestartSettingsTest, ACutOrDamagedFileIsNotTakenForSettings) {
   }
 }
 
+TEST_F(RestartSettingsTest, AFileThatIsRemovedDuringTheRunIsPutBack) {
+  double now = 0.0;
+  RestartSettingsFile file(folder_ / "settings.dat", [&now] { return now; });
+  file.write(read());
+  const std::string written = folder_.read("settings.dat");
+  const auto isThereAt = [&](double time) {
+    std::filesystem::remove(folder_ / "settings.dat");
+    now = time;
+    EXPECT_EQ(file.keep(), "");
+    return folder_.exists("settings.dat");
+  };
+  EXPECT_FALSE(isThereAt(0.5));
+  EXPECT_TRUE(isThereAt(1.5));
+  EXPECT_EQ(folder_.read("settings.dat"), written);
+  std::filesystem::create_directory(folder_ / "settings.dat.tmp");
+  EXPECT_FALSE(std::filesystem::remove(folder_ / "settings.dat") && (now = 3.0, file.keep().empty()));
+}
+
 /// A run whose result file holds the rows that a test gives it.
 class EarlierRunTest : public SetupFixture {
  protected:
@@ -113,7 +131,7 @@ class EarlierRunTest : public SetupFixture {
   std::string taken(const RunConfig& then, const RunConfig& now, const std::string& rows) {
     const RestartFiles files = restartFiles(folder_ / "setup", run_files::kOptimisation);
     folder_.write("setup_Optimisation.dat", "# Started: then\n# Restarted: later\n" + std::string(kHeader) + rows);
-    writeRestartSettings(files.settings, then);
+    RestartSettingsFile(files.settings).write(then);
     try {
       const auto run = findEarlierRun(files, now, {{"Depth", "Rate"}, {"Flow error", "Written"}, {"Flow"}}, record_);
       if (!run) return "nothing";
