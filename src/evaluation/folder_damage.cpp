@@ -29,6 +29,8 @@ std::string faultOfAccess(const std::string& path, int access) {
 
 std::string faultOfParameterFile(const std::string& path) {
   std::string fault = faultOfFile(path);
+  // A file that must not be written is removed and made again, but an immutable one cannot be.
+  if (fault.empty() && ::access(path.c_str(), W_OK) != 0 && errno == EPERM) fault = std::strerror(errno);
   return fault.empty() ? faultOfAccess(folderOf(path), W_OK | X_OK) : fault;
 }
 
