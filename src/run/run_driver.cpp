@@ -25,6 +25,7 @@
 #include "evaluation/local_evaluator.h"
 #include "evaluation/ranks/rank_evaluator.h"
 #include "measures/period_series.h"
+#include "platform/processes/child_guard.h"
 #include "platform/processes/posix_process_launcher.h"
 #include "platform/processes/process_folder.h"
 #include "platform/signals/signal_state.h"
