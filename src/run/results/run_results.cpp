@@ -100,8 +100,23 @@ void RunResults::open(const RunConfig& config, std::span<const ObservedSeries> o
   } else {
     if (config.restart != RestartMode::startAfresh)
       log.line("Restart: there are no earlier results to go on from, the run starts afresh");
+    if (config.restart != RestartMode::startAfresh) warnOfLostRows(log);
     startAfresh(config, log);
   }
+}
+
+/// Before what is left is kept under numbered names.
+void RunResults::warnOfLostRows(RunLog& log) const {
+  std::string ignored;
+  std::error_code failed;
+  const std::size_t lost = readRowChecksums(readTextFile(files_.checksums, ignored).value_or("")).size();
+  const std::uintmax_t size = std::filesystem::file_size(files_.results, failed);
+  // A kill may leave one checksum without its row behind a head.
+  if (failed || lost == 0 || (lost == 1 && size > 0)) return;
+  log.warning(
+      fmt::format("{} has no rows, though {} has checksums of {}: something has emptied it, and these "
+                  "evaluations are lost",
+                  files_.results, fileNameOf(files_.checksums), lost));
 }
 
 std::vector<std::string> RunResults::bandPaths(const RunConfig& config) const {

@@ -64,6 +64,7 @@ class RunResults final {
 
  private:
   void lockFailedRuns(RunLog& log);
+  void warnOfLostRows(RunLog& log) const;
   void startAfresh(const RunConfig& config, RunLog& log);
   void keepEarlierFiles(const RunConfig& config, RunLog& log) const;
   /// Account, tables of failures, pairs and checksums, those of analyses.
