@@ -138,6 +138,7 @@ class EarlierRunTest : public SetupFixture {
       EXPECT_EQ(run->started, record_ ? record_->started : "then");
       EXPECT_THAT(run->restarted, ElementsAre("later"));
       searches_ = run->searches;
+      notes_ = run->notes;
       std::string numbers;
       for (const ResultRow& entry : run->rows) numbers += std::to_string(entry.number) + " ";
       return numbers;
@@ -148,6 +149,7 @@ class EarlierRunTest : public SetupFixture {
 
   std::optional<RunRecord> record_;  ///< none: of a version of the program that left none
   std::vector<EarlierSearch> searches_;
+  std::vector<std::string> notes_;
 };
 
 TEST_F(EarlierRunTest, RowsThatTheRunGoesOnFrom) {
@@ -159,6 +161,10 @@ TEST_F(EarlierRunTest, RowsThatTheRunGoesOnFrom) {
   record_.emplace().started = "the day before";
   record_->restarted = {"later"};
   EXPECT_EQ(taken(config, config, rows + "6\tOK\t400\t0"), "1 2 3 4 5 ");
+  EXPECT_THAT(notes_, ElementsAre(HasSubstr("damaged are made again: 1"), HasSubstr("no checksum")));
+  EXPECT_EQ(taken(config, config, rows + "6\tOK\t400\t0\nof another\n5\tOK\n99\tOK\n"), "1 2 3 4 5 ");
+  EXPECT_THAT(notes_, ElementsAre(HasSubstr("made again: 1"), HasSubstr("no rows of this run are passed over: 3"),
+                                  HasSubstr("no checksum")));
   EXPECT_EQ(taken(config, config, rows + row(30) + row(31)), "1 2 3 4 5 30 31 ");
   config.restart = RestartMode::goOnAndRepeatFailed;
   EXPECT_EQ(taken(config, config, rows), "1 2 ");
