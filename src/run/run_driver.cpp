@@ -153,7 +153,10 @@ void RunDriver::openRun(const std::string& setupFileName) {
   const std::string terminationLog = runFilePath(filePrefix_, run_files::kTerminationLog);
   const bool leavesEnding =
       std::filesystem::exists(setup.file, ignored) || std::filesystem::exists(terminationLog, ignored);
-  const std::string terminationLogProblem = leavesEnding ? openTerminationLog(terminationLog) : std::string();
+  std::string keptTerminationLog;
+  const std::string terminationLogProblem =
+      leavesEnding ? openTerminationLog(terminationLog, &keptTerminationLog) : std::string();
+  logKept(terminationLog, keptTerminationLog, state_.log);
   const std::string progressProblems = state_.progress.progressInit(logFile, environmentValue("VOLK_PROGRESS"));
   state_.progress.progressStart(dateAndTimeWithZone(), hostName(), ::getpid());
   state_.log.passWarningsTo([this](std::string_view text) { state_.progress.writeMessage(text); });

@@ -181,7 +181,9 @@ TEST(StopRun, ATerminationLogIsThatOfTheLatestRunAndAnEarlierOneStillWritesItsOw
   const TemporaryFolder folder;
   const auto runTwice = [&] {
     setTerminationLogUnit(0);
-    EXPECT_EQ(openTerminationLog(folder / "a.log"), "");
+    std::string kept;
+    EXPECT_EQ(openTerminationLog(folder / "a.log", &kept), "");
+    EXPECT_EQ(kept, folder / "a.1.log");
     const int earlier = signalState.terminationLogUnit;
     setTerminationLogUnit(0);
     EXPECT_EQ(openTerminationLog(folder / "a.log"), "");
