@@ -302,12 +302,7 @@ TEST_F(PosixProcessLauncherTest, NothingOutlivesTheProgram) {
     });
     ::raise(SIGTERM);
   };
-  const auto leaveWithGuard = [&leave](int signal) {
-    return [&leave, signal] {
-      signalGuard(signal);
-      leave();
-    };
-  };
+  const auto leaveWithGuard = [&](int signal) { return [=] { (signalGuard(signal), leave()); }; };
   const std::pair<const char*, std::function<void()>> cases[] = {{"kill -9", kill},
                                                                  {"kill -9, first its guard", kill},
                                                                  {"kill -9, without pidfds", kill},

@@ -114,8 +114,6 @@ TEST_F(RestartSettingsTest, AFileThatIsRemovedDuringTheRunIsPutBack) {
   EXPECT_FALSE(isThereAt(0.5));
   EXPECT_TRUE(isThereAt(1.5));
   EXPECT_EQ(folder_.read("settings.dat"), written);
-  std::filesystem::create_directory(folder_ / "settings.dat.tmp");
-  EXPECT_FALSE(std::filesystem::remove(folder_ / "settings.dat") && (now = 3.0, file.keep().empty()));
 }
 
 /// A run whose result file holds the rows that a test gives it.

@@ -156,8 +156,7 @@ TEST_F(ResultFileTest, OneThatSeemsShorterForAMomentIsNot) {
 
 TEST_F(ResultFileTest, OneThatAnotherFileReplacesIsNotCalledRemoved) {
   open();
-  folder_.write("other", "");
-  std::filesystem::rename(folder_ / "other", path_);
+  std::filesystem::rename(folder_.write("other", ""), path_);
   EXPECT_THAT(refusalOf([this] { add(success(1, 1, 1), 1); }), testing::HasSubstr("another program has replaced it"));
 }
 
