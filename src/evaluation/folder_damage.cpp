@@ -2,6 +2,7 @@
 
 #include <cerrno>
 #include <cstring>
+#include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
 #include <utility>
@@ -27,8 +28,16 @@ std::string faultOfAccess(const std::string& path, int access) {
   return ::access(path.c_str(), access) == 0 ? std::string() : std::strerror(errno);
 }
 
+/// Whether not even its owner may remove the file, as for each run (`chattr +i`).
+bool isImmutable(const std::string& path) {
+  struct statx status {};
+  return ::statx(AT_FDCWD, path.c_str(), 0, STATX_TYPE, &status) == 0 &&
+         (status.stx_attributes & (STATX_ATTR_IMMUTABLE | STATX_ATTR_APPEND)) != 0;
+}
+
 std::string faultOfParameterFile(const std::string& path) {
   std::string fault = faultOfFile(path);
+  if (fault.empty() && isImmutable(path)) fault = "it is immutable";
   return fault.empty() ? faultOfAccess(folderOf(path), W_OK | X_OK) : fault;
 }
 

@@ -76,9 +76,14 @@ std::string_view resistanceUpdateText(ResistanceUpdate outcome) {
   return {};
 }
 
-void removeFile(const std::string& path) {
-  if (::unlink(path.c_str()) == 0 || errno == ENOENT || errno == ENOTDIR) return;
-  fatalError("Error: Unable to remove " + path, std::strerror(errno));
+/// 0 if the file is gone, else errno.
+int errorOfRemoval(const std::string& path) {
+  return ::unlink(path.c_str()) == 0 || errno == ENOENT || errno == ENOTDIR ? 0 : errno;
+}
+
+/// Such a file the model has left (immutable, mounted over); any other reason is the disk's.
+bool isDoneByModel(int error) {
+  return error == EPERM || error == EACCES || error == EBUSY;
 }
 
 }  // namespace
@@ -226,6 +231,7 @@ std::optional<FolderDamage> ModelRunner::renewIfDamaged(int slot, std::vector<st
   if (!files.isUsed) return std::nullopt;
   const std::string folder = launcher_.getProcessFolder(slot);
   auto damage = findDamage(folder, needs_);
+  if (!damage) damage = removeResults(files);
   if (!damage) {
     files.isRenewed = false;
     return std::nullopt;
@@ -243,6 +249,18 @@ std::optional<FolderDamage> ModelRunner::renewIfDamaged(int slot, std::vector<st
   return std::nullopt;
 }
 
+/// Files of an earlier run must never be taken for results of the next one.
+std::optional<FolderDamage> ModelRunner::removeResults(const SlotFiles& files) {
+  std::vector<std::string> results = files.output.simulationFiles;
+  if (!files.output.measureFile.empty()) results.push_back(files.output.measureFile);
+  for (const std::string& path : results) {
+    const int error = errorOfRemoval(path);
+    if (isDoneByModel(error)) return FolderDamage{"Unable to remove " + path, std::strerror(error)};
+    if (error != 0) fatalError("Error: Unable to remove " + path, std::strerror(error));
+  }
+  return std::nullopt;
+}
+
 std::optional<EvaluationFailure> ModelRunner::prepareModelRun(std::span<const double> set, int slot) {
   const auto mapped = parameters_.MapToModelValues(set);
   if (const auto* failure = std::get_if<ParameterFailure>(&mapped)) return parameterFailure(*failure);
@@ -250,9 +268,7 @@ std::optional<EvaluationFailure> ModelRunner::prepareModelRun(std::span<const do
   if (auto failure = findUnwritable(modelValues)) return failure;
   SlotFiles& files = slots_.at(static_cast<std::size_t>(slot - 1));
   files.isUsed = true;
-  // Files of an earlier run must never be taken for results of this one.
-  for (const std::string& path : files.output.simulationFiles) removeFile(path);
-  if (!files.output.measureFile.empty()) removeFile(files.output.measureFile);
+  if (const auto damage = removeResults(files)) fatalError("Error: " + damage->what, damage->why);
   savedFiles_.markAsOld(launcher_.getProcessFolder(slot));
   for (std::size_t i = 0; i < templates_.size(); ++i) {
     const std::string& path = files.parameterFiles[i];

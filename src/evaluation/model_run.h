@@ -91,6 +91,7 @@ class ModelRunner final {
   FolderNeeds folderNeeds(const LauncherSettings& settings) const;
   void requireFilesInBaseFolder() const;
   void writeConvertedTemplates(int slot) const;
+  static std::optional<FolderDamage> removeResults(const SlotFiles& files);
   void readTemplates();
   /// The failure of a set with a value that a template has no form for; empty when all can be written.
   std::optional<EvaluationFailure> findUnwritable(std::span<const double> modelValues) const;

@@ -1,7 +1,9 @@
 #include "report/run_report.h"
 
 #include <algorithm>
+#include <cerrno>
 #include <cmath>
+#include <cstring>
 #include <exception>
 #include <filesystem>
 #include <limits>
@@ -58,6 +60,7 @@ class ReportBuilder final {
   void findBestAndInitial();
   void addMeasures();
   PairsByNumber pairsOfRuns() const;
+  void notePairsThatAreLost(const PairsByNumber& pairs);
   void noteDifferencesOfBest();
   void addFailures();
   void addSeries();
@@ -258,10 +261,19 @@ PairsByNumber ReportBuilder::pairsOfRuns() const {
   return readPairs(filePrefix_, config_.task->facts().resultFiles).content.value_or(PairsByNumber{});
 }
 
+/// Versions of the program that wrote none left no file.
+void ReportBuilder::notePairsThatAreLost(const PairsByNumber& pairs) {
+  const OptionalSource<PairsByNumber> source = readPairs(filePrefix_, config_.task->facts().resultFiles);
+  if (!pairs.empty() || (!source.content && source.reason == std::strerror(ENOENT))) return;
+  note(fmt::format("Whether the best evaluation differs from the first successful run is not known: {}: {}.",
+                   source.file, source.content ? "it is cut off or damaged" : source.reason));
+}
+
 /// In a run that has come to its end, other than by a signal, the closing lines of its results say so.
 void ReportBuilder::noteDifferencesOfBest() {
   if (best_ == nullptr) return;
   const PairsByNumber pairs = pairsOfRuns();
+  notePairsThatAreLost(pairs);
   const auto sources = measureSources(config_.measures, config_.measureFile, config_.baseFolder);
   std::vector<RunDifference> differences = findLackOfBest(best_->number, pairs, sources);
   if (const auto ofBest = pairs.find(best_->number); ofBest != pairs.end()) {

@@ -21,6 +21,7 @@
 #include "common/version.h"
 #include "evaluation/local_evaluator.h"
 #include "evaluation/ranks/rank_evaluator.h"
+#include "platform/processes/child_guard.h"
 #include "platform/processes/posix_process_launcher.h"
 #include "platform/processes/process_folder.h"
 #include "platform/signals/signal_state.h"
@@ -150,7 +151,10 @@ void RunDriver::openRun(const std::string& setupFileName) {
   const std::string terminationLog = runFilePath(filePrefix_, run_files::kTerminationLog);
   const bool leavesEnding =
       std::filesystem::exists(setup.file, ignored) || std::filesystem::exists(terminationLog, ignored);
-  const std::string terminationLogProblem = leavesEnding ? openTerminationLog(terminationLog) : std::string();
+  std::string keptTerminationLog;
+  const std::string terminationLogProblem =
+      leavesEnding ? openTerminationLog(terminationLog, &keptTerminationLog) : std::string();
+  logKept(terminationLog, keptTerminationLog, state_.log);
   const std::string destination = environmentValue("VOLK_PROGRESS");
   const std::string progressProblems = state_.progress.progressInit(logFile, destination);
   if (wantsLiveLine(destination)) {
@@ -243,6 +247,7 @@ void RunDriver::openResults() {
   reporter_ = std::make_unique<RunReporter>(state_, results_->table(), results_->failedRuns(),
                                             parameters_->searchSpace(), results_->simulatedValues(), &results_->pairs(),
                                             &results_->unkeptFiles(), runner_->output().sources());
+  reporter_->keepSettings(results_->settings());
   EarlierEvaluations* const earlier = results_->earlierEvaluations();
   series_ = openSeries(config_, parameters_->searchSpace(), runner_->output(),
                        runFilePath(filePrefix_, run_files::kSeries), earlier != nullptr, state_.log);
@@ -364,6 +369,7 @@ std::optional<RunDriver::Unwritten> RunDriver::closeResults(const Ending& ending
   if (!results_) return std::nullopt;
   std::optional<Unwritten> unwritten;
   std::string reason;
+  if (!results_->settings().putBack(reason)) unwritten = {results_->settings().path(), reason};
   if (!results_->table().finish(lines, reason)) unwritten = {results_->table().path(), reason};
   if (reporter_ && !results_->pairs().finish(reporter_->numbersWithPairs(), reason) && !unwritten) {
     unwritten = {results_->pairs().path(), reason};

@@ -96,6 +96,9 @@ std::string RunReporter::absentWarning() const {
 
 void RunReporter::recordEvaluation(std::span<const double> set, const EvaluationResult& result) {
   const std::vector<double> values = ToModelScale(space_, set);
+  if (settings_ != nullptr) {
+    if (const std::string text = settings_->keep(); !text.empty()) warning(text);
+  }
   // The row is written last: if it is on disk, all that belongs to it is, too, whenever the program ends.
   if (!result.ok()) failedRuns_.add(values, result);
   if (result.ok() && simulatedValues_ != nullptr) simulatedValues_->add(values, result);

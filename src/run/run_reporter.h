@@ -15,6 +15,7 @@
 #include "run/results/failed_run_file.h"
 #include "run/results/failure_summary.h"
 #include "run/results/pairs_file.h"
+#include "run/results/restart.h"
 #include "run/results/result_file.h"
 #include "run/results/series_recorder.h"
 #include "run/results/simulated_values_file.h"
@@ -35,6 +36,9 @@ class RunReporter final : public EvaluationObserver {
 
   /// From now on `recorder` records the series of the initial and the best evaluation; it must outlive the reporter.
   void recordSeries(SeriesRecorder& recorder) { recorder_ = &recorder; }
+
+  /// From now on `settings` are on disk whenever a row is written; they must outlive the reporter.
+  void keepSettings(RestartSettingsFile& settings) { settings_ = &settings; }
 
   void message(std::string_view text) override;
   void warning(std::string_view text) override;
@@ -109,6 +113,7 @@ class RunReporter final : public EvaluationObserver {
   UnkeptFiles* unkeptFiles_;
   std::vector<MeasureSource> sources_;
   SeriesRecorder* recorder_ = nullptr;
+  RestartSettingsFile* settings_ = nullptr;
   BestChoice best_;
   InitialChoice initial_;
   std::vector<Unsettled> unsettled_;

@@ -5,6 +5,7 @@
 #include <cstdlib>
 #include <poll.h>
 #include <signal.h>
+#include <sys/stat.h>
 #include <sys/syscall.h>
 #include <ucontext.h>
 #include <unistd.h>
@@ -56,17 +57,25 @@ bool isRequest(int signalNumber) noexcept {
   return std::find(kEndingRequests.begin(), kEndingRequests.end(), signalNumber) != kEndingRequests.end();
 }
 
+/// Something has emptied the file. It stays so, as the next run would not know it for one of its own by this line.
+bool isEmptied(int descriptor) noexcept {
+  struct stat status {};
+  return ::fstat(descriptor, &status) == 0 && S_ISREG(status.st_mode) && status.st_size == 0;
+}
+
 [[noreturn]] void endRun(int signalNumber, std::string_view message) noexcept {
   const int terminationLog = signalState.terminationLogUnit;
   if (terminationLog > 0) writeLineFromSignal(terminationLog, message);
   // The reason is in the log before the model processes are ended.
-  if (const int runLog = signalState.runLogDescriptor; runLog >= 0) {
+  if (const int runLog = signalState.runLogDescriptor; runLog >= 0 && !isEmptied(runLog)) {
     writeLineFromSignal(runLog, "");
     writeLineFromSignal(runLog, message);
   }
   if (void (*halt)() = signalState.haltProcesses; halt != nullptr) halt();
-  if (const int results = signalState.resultFileDescriptor; results >= 0) writeLineFromSignal(results, message, "# ");
-  if (const int record = signalState.runRecordDescriptor; record >= 0) {
+  if (const int results = signalState.resultFileDescriptor; results >= 0 && !isEmptied(results)) {
+    writeLineFromSignal(results, message, "# ");
+  }
+  if (const int record = signalState.runRecordDescriptor; record >= 0 && !isEmptied(record)) {
     writeLineFromSignal(record, message, (isRequest(signalNumber) ? endingOnRequest : endingInCrash).view());
   }
   if (const int records = signalState.messageFileDescriptor; records >= 0) {

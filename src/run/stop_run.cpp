@@ -8,6 +8,7 @@
 #include <string_view>
 #include <system_error>
 #include <unistd.h>
+#include <utility>
 
 #include <fmt/core.h>
 
@@ -24,14 +25,17 @@ void setTerminationLogUnit(int unit) {
   signalState.terminationLogUnit = unit;
 }
 
-std::string openTerminationLog(const std::string& path) {
+std::string openTerminationLog(const std::string& path, std::string* kept) {
   if (signalState.terminationLogUnit > 0) return {};
   // A user's own file, or the log of a setup `basin_Termination.kdx`. What a link leads to stays as it is.
   std::string reason;
   std::error_code ignored;
   const bool isFile = std::filesystem::symlink_status(path, ignored).type() == std::filesystem::file_type::regular;
   const auto head = isFile ? readFileHead(path, reason) : std::string();
-  if (!head || (!head->empty() && !isTerminationLog(*head))) keepEarlierFile(path);
+  if (!head || (!head->empty() && !isTerminationLog(*head))) {
+    std::string name = keepEarlierFile(path);
+    if (kept != nullptr) *kept = std::move(name);
+  }
   // Removed rather than emptied: an earlier run that is just ending then writes its last line to its own file.
   ::unlink(path.c_str());
   const int unit = ::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_APPEND | O_CLOEXEC, 0666);

@@ -14,6 +14,7 @@
 #include "common/run_files.h"
 #include "evaluation/ranks/rank_worker.h"
 #include "parameters/parameter_model.h"
+#include "platform/processes/child_guard.h"
 #include "platform/processes/posix_process_launcher.h"
 #include "platform/signals/signal_state.h"
 #include "platform/terminal/front_end.h"

@@ -1,4 +1,5 @@
 #include <cerrno>
+#include <cstdlib>
 #include <cstring>
 #include <memory>
 #include <sched.h>
@@ -228,6 +229,15 @@ void tryKeptFolders(bool isLong, FaultReport& report) {
   }
 }
 
+bool isDone(const std::string& command, const std::string& path) {
+  return std::system(fmt::format(fmt::runtime(command + " >/dev/null 2>&1"), path).c_str()) == 0;
+}
+
+bool canMakeImmutable(const TemporaryFolder& folder) {
+  const std::string file = folder.write("file", "");
+  return isDone("chattr +i {}", file) && isDone("chattr -i {}", file);
+}
+
 /// A model that leaves its process folder unusable, in the second of two slots or in both.
 void tryDamagedFolders(FaultReport& report) {
   // what it does, the slots, what the log says
@@ -237,11 +247,19 @@ void tryDamagedFolders(FaultReport& report) {
       {"rm -f simulated.csv; mkdir simulated.csv simulated.csv/x", "2", "Slot 2 is given up"},
       {"rm run.sh", "2", "Slot 2 is given up"},
       {"rm parameters.txt; mkdir parameters.txt", "2", "Slot 2 is given up"},
+      {"chattr +i simulated.csv", "2", "Slot 2 is given up"},
+      {"chattr +i parameters.txt", "2", "Slot 2 is given up"},
+      {"chattr +i simulated.csv", "?", "no process folder is left"},
       {"rm parameters.txt", "?", "no process folder is left"},
       {"mv simulated.csv {0}; ln -s {0}/simulated.csv .", "2", "leads to"}};
   for (const auto& [damage, slots, told] : kCases) {
     const TemporaryFolder outside;
     const std::string command = fmt::format(fmt::runtime(damage), outside.path());
+    const bool isImmutable = command.starts_with("chattr");
+    if (isImmutable && !canMakeImmutable(outside)) {
+      report.skipped("damaged folders", command + " is not permitted or not known here");
+      continue;
+    }
     FaultyRun run(RunSettings{.option = 3, .maxEvaluations = 30, .slots = 2},
                   fmt::format("{0} \"$@\" || exit 1\n"
                               "test -e {1}/armed && case $PWD in *_Process{2}) {3};; esac\n"
@@ -254,6 +272,7 @@ void tryDamagedFolders(FaultReport& report) {
     const auto problems =
         run.check(run.run({}), {.names = {told}, .mayFailEvaluation = true, .exitCode = isFatal ? 1 : 0});
     fs::remove(outside / "armed");
+    if (isImmutable) isDone("find {} -type f -exec chattr -i {{}} +", run.path());
     report.tried("damaged folders", command + " in slot " + slots, problems, run.checkNextRun());
   }
 }
@@ -271,6 +290,7 @@ void tryRemovedFiles(FaultReport& report) {
       {"basin_Process1/parameters.txt", nullptr, ""},
       {"basin_Process1/run.sh", nullptr, ""},
       {"basin_Optimisation.dat", nullptr, ""},
+      {"basin_Optimisation_Restart.dat", nullptr, ""},
       {"basin.log", nullptr, ""}};
   for (const auto& [removed, named, reason] : kCases) {
     const TemporaryFolder outside;
@@ -290,6 +310,7 @@ void tryRemovedFiles(FaultReport& report) {
     expected.exitCode = named == nullptr ? 0 : 1;
     auto problems = run.check(result, expected);
     if (run.folder().read("basin.log").find("Setup file:") == std::string::npos) problems.push_back("the log is lost");
+    if (!run.folder().exists("basin_Optimisation_Restart.dat")) problems.push_back("the settings are not put back");
     report.tried("files removed during the run", removed, problems);
   }
 }

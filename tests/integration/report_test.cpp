@@ -227,9 +227,11 @@ TEST(Report, SaysWhatIsMissingInItsFilesAndIsNotMadeOfWhatIsNotThere) {
       AllOf(HasSubstr("The setup was changed since: Sample_Size of UNCERTAINTY_ESTIMATION: 5 then, 6 now. The "),
             HasSubstr("basin_Series.dat is cut off or damaged: it ends above its rows."),
             HasSubstr("basin_Band_1.csv is not there, and its band is not shown.")));
+  cutTo("basin_Pairs.dat", 60);
   cutTo("basin_Restart.dat", 200);
   EXPECT_EQ(makeReport(folder).exitCode, 0);
-  EXPECT_THAT(reportData(folder), HasSubstr("since is not known: basin_Restart.dat: it is cut off or damaged."));
+  EXPECT_THAT(reportData(folder), AllOf(HasSubstr("since is not known: basin_Restart.dat: it is cut off or damaged."),
+                                        HasSubstr("run is not known: basin_Pairs.dat: it is cut off or damaged.")));
   std::filesystem::remove(folder / "basin_Restart.dat");
   EXPECT_EQ(makeReport(folder).exitCode, 0);
   EXPECT_THAT(reportData(folder), HasSubstr("since is not known: basin_Restart.dat: No such file or directory."));

@@ -103,6 +103,10 @@ TEST_F(Restart, AFinishedRunIsWalkedThroughAndEndsWithTheSameFile) {
                            "basin_Band_1.", "basin_Band_2.", "basin_Series."}) {
     EXPECT_THAT(log(), HasSubstr(" of an earlier run was kept as " + (folder_ / name) + "1.")) << name;
   }
+  folder_.editSetup("Restart = 0", "Restart = 1");
+  folder_.write(resultFile_, "");
+  run();
+  EXPECT_THAT(log(), HasSubstr("basin.dat has no rows, though basin_Checksums.dat has checksums of 20: something"));
 }
 
 TEST_F(Restart, ARaisedBudgetTakesAFinishedSearchFurther) {

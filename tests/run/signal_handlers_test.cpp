@@ -33,10 +33,15 @@ void actWithHandlers(const TemporaryFolder& folder, Act act, const char* buildMo
   ::setenv("BUILDMODE", buildMode, 1);
   ::setenv("G48", frontEnd, 1);
   ::dup2(open("stdout"), STDOUT_FILENO);
-  signalState.runLogDescriptor = open("run.log");
-  signalState.resultFileDescriptor = open("results");
+  const auto openWithHead = [&](const char* name) {
+    const int file = open(name);
+    writeLineFromSignal(file, "#");
+    return file;
+  };
+  signalState.runLogDescriptor = openWithHead("run.log");
+  signalState.resultFileDescriptor = openWithHead("results");
   signalState.messageFileDescriptor = open("records");
-  signalState.runRecordDescriptor = open("record");
+  signalState.runRecordDescriptor = openWithHead("record");
   setTerminationLogUnit(open("termination.log"));
   installSignalHandlers();
   act();
@@ -55,9 +60,9 @@ TEST(SignalHandlers, EverySignalEndsTheRunWithItsMessageInEveryPlace) {
     const TemporaryFolder folder;
     EXPECT_EXIT(actWithHandlers(folder, [signal = signal] { ::raise(signal); }),
                 ::testing::ExitedWithCode(128 + signal), fmt::format("^run_tests: {}\n$", message));
-    EXPECT_EQ(folder.read("run.log"), fmt::format("\n{}\n", message));
-    EXPECT_EQ(folder.read("results"), fmt::format("# {}\n", message));
-    const auto record = readRunRecord(runRecordText({}, {}) + folder.read("record"));
+    EXPECT_EQ(folder.read("run.log"), fmt::format("#\n\n{}\n", message));
+    EXPECT_EQ(folder.read("results"), fmt::format("#\n# {}\n", message));
+    const auto record = readRunRecord(runRecordText({}, {}) + folder.read("record").substr(2));
     ASSERT_TRUE(record.has_value());
     EXPECT_EQ(record->stage, stage);
     EXPECT_EQ(record->message, message);
@@ -84,7 +89,17 @@ TEST(SignalHandlers, TheReasonIsLoggedBeforeTheModelIsHalted) {
     ::raise(SIGINT);
   };
   EXPECT_EXIT(actWithHandlers(folder, haltWhileSayingSo), ::testing::ExitedWithCode(130), "");
-  EXPECT_EQ(folder.read("run.log"), "\nControl-C send\nhalted\n");
+  EXPECT_EQ(folder.read("run.log"), "#\n\nControl-C send\nhalted\n");
+}
+
+TEST(SignalHandlers, FilesThatSomethingHasEmptiedStayEmpty) {
+  const TemporaryFolder folder;
+  const auto emptyAndEnd = [&] {
+    for (const char* name : {"run.log", "results", "record"}) ::truncate((folder / name).c_str(), 0);
+    ::raise(SIGTERM);
+  };
+  EXPECT_EXIT(actWithHandlers(folder, emptyAndEnd), ::testing::ExitedWithCode(143), "");
+  for (const char* name : {"run.log", "results", "record"}) EXPECT_EQ(folder.read(name), "") << name;
 }
 
 TEST(SignalHandlers, ARunUnderNohupOutlivesItsTerminal) {
@@ -112,7 +127,7 @@ TEST(SignalHandlers, ARequestWaitsForTheEndOfAStepOfTheMainThread) {
     other.join();
   };
   EXPECT_EXIT(actWithHandlers(folder, askInTheMiddle), ::testing::ExitedWithCode(143), "");
-  EXPECT_EQ(folder.read("results"), "whole record\n# Termination request\n");
+  EXPECT_EQ(folder.read("results"), "#\nwhole record\n# Termination request\n");
 }
 
 TEST(SignalHandlers, FloatingPointSubCodesHaveTheirOwnMessages) {
@@ -166,7 +181,9 @@ TEST(StopRun, ATerminationLogIsThatOfTheLatestRunAndAnEarlierOneStillWritesItsOw
   const TemporaryFolder folder;
   const auto runTwice = [&] {
     setTerminationLogUnit(0);
-    EXPECT_EQ(openTerminationLog(folder / "a.log"), "");
+    std::string kept;
+    EXPECT_EQ(openTerminationLog(folder / "a.log", &kept), "");
+    EXPECT_EQ(kept, folder / "a.1.log");
     const int earlier = signalState.terminationLogUnit;
     setTerminationLogUnit(0);
     EXPECT_EQ(openTerminationLog(folder / "a.log"), "");

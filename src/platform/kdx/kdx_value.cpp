@@ -49,6 +49,14 @@ std::optional<KdxValue> readNumber(std::string_view word, KdxPosition start) {
   return std::nullopt;
 }
 
+/// Whether the text begins with a date in a form that is none here, "31.01.2001" or "2001/1/31".
+bool hasOtherDateForm(std::string_view text) {
+  if (!takeNumber(text, 1, 4)) return false;
+  const std::string_view separator = text.substr(0, 1);
+  if (separator != "." && separator != "/") return false;
+  return takeText(text, separator) && takeNumber(text, 1, 2) && takeText(text, separator) && takeNumber(text, 1, 4);
+}
+
 }  // namespace
 
 KdxCursor::KdxCursor(std::string_view text) : text_(text) {
@@ -119,7 +127,9 @@ std::variant<KdxValue, KdxSyntaxError> readKdxValue(KdxCursor& cursor, char sepa
     return *std::move(number);
   }
   return KdxSyntaxError{
-      start, fmt::format("expected a number, a date or a text between quotes, found {}", quotedForMessage(item)),
+      start,
+      fmt::format("expected a number, a date or a text between quotes, found {}{}", quotedForMessage(item),
+                  hasOtherDateForm(item) ? "; a date is written as 2001-01-31" : ""),
       KdxUnquotedText{std::string(item)}};
 }
 

@@ -1,6 +1,7 @@
 #include "platform/processes/child_guard.h"
 
 #include <algorithm>
+#include <atomic>
 #include <cerrno>
 #include <csignal>
 #include <cstring>
@@ -56,6 +57,9 @@ void awaitEnd(pid_t program, int watched) {
   ::_exit(0);
 }
 
+std::atomic<const ChildGuard*> currentGuard{nullptr};
+static_assert(std::atomic<const ChildGuard*>::is_always_lock_free);
+
 std::string howEnded(int status) {
   if (WIFSIGNALED(status)) return endedBySignal(WTERMSIG(status));
   return fmt::format("has ended with code {}", WEXITSTATUS(status));
@@ -63,7 +67,13 @@ std::string howEnded(int status) {
 
 }  // namespace
 
+ChildGuard::ChildGuard(const ProcessGroupTable& table, const ProcessMark& mark) : table_(table), mark_(mark) {
+  currentGuard = this;
+}
+
 ChildGuard::~ChildGuard() {
+  const ChildGuard* self = this;
+  currentGuard.compare_exchange_strong(self, nullptr);
   if (process_ <= 0) return;
   ::kill(process_, SIGKILL);
   while (::waitpid(process_, nullptr, 0) < 0 && errno == EINTR) {
@@ -107,6 +117,31 @@ std::optional<std::string> ChildGuard::renewIfEnded() {
         "their group would outlive a program that is killed";
   }
   return text;
+}
+
+bool ChildGuard::isThere() const noexcept {
+  siginfo_t ended{};
+  const auto id = static_cast<id_t>(process_);
+  return process_ > 0 && ::waitid(P_PID, id, &ended, WEXITED | WNOHANG | WNOWAIT) == 0 && ended.si_pid == 0;
+}
+
+void ChildGuard::relieve() const noexcept {
+  // What killed it may have sent this program its signal at once, before the guard is gone.
+  constexpr int kLooks = 10;
+  constexpr timespec kPause{0, 2'000'000};
+  const int saved = errno;
+  bool isThereStill = true;
+  for (int look = 0; look < kLooks && (isThereStill = isThere()); ++look) {
+    ::kill(process_, SIGCONT);
+    ::nanosleep(&kPause, nullptr);
+  }
+  errno = saved;
+  if (!isThereStill) mark_.endBearers();
+}
+
+void haltProcessesFromSignal() noexcept {
+  haltGroupsFromSignal();
+  if (const ChildGuard* guard = currentGuard.load()) guard->relieve();
 }
 
 }  // namespace mirevo

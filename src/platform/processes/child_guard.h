@@ -16,7 +16,7 @@ namespace mirevo {
 class ChildGuard final {
  public:
   /// Both must outlive the guard.
-  ChildGuard(const ProcessGroupTable& table, const ProcessMark& mark) : table_(table), mark_(mark) {}
+  ChildGuard(const ProcessGroupTable& table, const ProcessMark& mark);
   /// Ends the guard, but not the groups that are still running.
   ~ChildGuard();
   ChildGuard(const ChildGuard&) = delete;
@@ -35,7 +35,13 @@ class ChildGuard final {
   /// 0 while there is none.
   pid_t process() const { return process_; }
 
+  /// For a signal handler that is about to end the program: makes a stopped guard continue, and ends the bearers of the
+  /// mark itself if there is no guard any more. Async-signal-safe.
+  void relieve() const noexcept;
+
  private:
+  bool isThere() const noexcept;
+
   const ProcessGroupTable& table_;
   const ProcessMark& mark_;
   pid_t process_ = 0;
@@ -43,5 +49,10 @@ class ChildGuard final {
   double nextLook_ = 0.0;  ///< for a rare one
   std::string limitation_;
 };
+
+/// Ends every running model process (SIGKILL) of the launcher that was initialised last, or leaves the end of those
+/// that are in no group to its guard. For signal handlers: async-signal-safe; takes some milliseconds while there is a
+/// guard.
+void haltProcessesFromSignal() noexcept;
 
 }  // namespace mirevo

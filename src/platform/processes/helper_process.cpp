@@ -83,6 +83,7 @@ int reap(pid_t process) {
 // library hold no lock that the helper needs, as the C library's are in order after a fork.
 bool HelperProcess::start(void (*serve)(int), std::string& reason) {
   end();
+  wasKilled_ = false;
   int sockets[2] = {-1, -1};
   if (::socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, sockets) != 0) {
     reason = std::strerror(errno);
@@ -118,11 +119,13 @@ void HelperProcess::end() {
   if (process_ <= 0) return;
   ::kill(process_, SIGKILL);
   endAndDescribe();
+  wasKilled_ = false;
 }
 
 std::string HelperProcess::endAndDescribe() {
   if (socket_ >= 0) ::close(std::exchange(socket_, -1));
   const int status = reap(std::exchange(process_, 0));
+  wasKilled_ = status != -1 && WIFSIGNALED(status) && WTERMSIG(status) == SIGKILL;
   return status != -1 && WIFSIGNALED(status) ? endedBySignal(WTERMSIG(status)) : "has ended";
 }
 

@@ -29,6 +29,9 @@ class HelperProcess final {
   void end();
   /// After Outcome::ended, waits for its end: "was ended by signal 11 (Segmentation fault)".
   std::string endAndDescribe();
+  /// After that: whether something else ended it with SIGKILL, which is no fault of its work. (A limit of its time ends
+  /// it with SIGXCPU, one of its memory with an answer.)
+  bool wasKilled() const { return wasKilled_; }
 
   /// Both wait until all of the bytes are through, the process has ended, or the time of `watch` is over.
   Outcome send(const void* bytes, std::size_t size, ReadingWatch& watch);
@@ -39,6 +42,7 @@ class HelperProcess final {
 
   pid_t process_ = 0;
   int socket_ = -1;
+  bool wasKilled_ = false;
 };
 
 /// Whether this child of the program is such a process, which it ends and reaps itself.

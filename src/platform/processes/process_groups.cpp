@@ -61,7 +61,7 @@ void ProcessGroupTable::makeCurrent() const noexcept {
   currentTable.store(this);
 }
 
-void haltProcessesFromSignal() noexcept {
+void haltGroupsFromSignal() noexcept {
   const int saved = errno;
   if (const ProcessGroupTable* table = currentTable.load()) table->signalAll(SIGKILL);
   errno = saved;

@@ -25,15 +25,15 @@ class ProcessGroupTable final {
   /// Sends the signal to every group in the table. Async-signal-safe.
   void signalAll(int signal) const noexcept;
 
-  /// Makes this the table that haltProcessesFromSignal() acts on, until it is destroyed.
+  /// Makes this the table that haltGroupsFromSignal() acts on, until it is destroyed.
   void makeCurrent() const noexcept;
 
  private:
   std::span<std::atomic<pid_t>> entries_;
 };
 
-/// Ends (SIGKILL) every running model process. Async-signal-safe: for signal handlers, which must not wait.
-void haltProcessesFromSignal() noexcept;
+/// Ends (SIGKILL) every running group of the current table. Async-signal-safe.
+void haltGroupsFromSignal() noexcept;
 
 /// A process of the system.
 struct FoundProcess {

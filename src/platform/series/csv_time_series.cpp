@@ -24,6 +24,7 @@ namespace {
 
 constexpr std::ptrdiff_t kLongestLine = std::ptrdiff_t{1} << 26;
 constexpr std::size_t kMostItems = 1'000'000;
+constexpr std::size_t kMostDoubts = 10;  ///< of comments
 
 std::string_view viewOf(const char* begin, const char* end) {
   return {begin, static_cast<std::size_t>(end - begin)};
@@ -59,6 +60,12 @@ std::string hintOfHour(std::string_view cell) {
   const auto hour = takeNumber(rest, 1, 2);
   if (!hour || *hour > 24 || !rest.empty()) return {};
   return fmt::format("; if {} is the hour: {}", cell, kOneColumn);
+}
+
+/// What goes behind a fault if the text of one cell or more may be numbers with decimal commas.
+std::string hintOfDecimalComma(std::string_view text) {
+  const bool isOfDigits = text.find_first_not_of("0123456789+-, ") == std::string_view::npos;
+  return isOfDigits && text.find(',') != std::string_view::npos ? "; numbers have a decimal point" : std::string{};
 }
 
 /// Whether a column with this heading seems to hold the time of day: "Hour", "HH:MM", "time (UTC)".
@@ -225,8 +232,10 @@ bool CsvTimeSeries::readRow(const char* line, const char* lineEnd, csv::DateScan
   second = *now;
   const int cellCount = csv::countSeparators(at, lineEnd, separator_, hasQuotes_);
   if (cellCount != itemCount()) {
-    return fail(line, std::to_string(items_.size() + 1) + " columns as in the header row",
-                std::to_string(cellCount + 1));
+    return fail(
+        line, std::to_string(items_.size() + 1) + " columns as in the header row",
+        std::to_string(cellCount + 1) +
+            (cellCount == 2 * itemCount() ? hintOfDecimalComma(viewOf(std::min(at + 1, lineEnd), lineEnd)) : ""));
   }
   times_.push_back(static_cast<double>(second - startSecond_) / 86400.0);
   cells_.push_back(static_cast<std::size_t>(at + 1 - content_.data()));
@@ -235,8 +244,12 @@ bool CsvTimeSeries::readRow(const char* line, const char* lineEnd, csv::DateScan
 
 std::vector<std::string> CsvTimeSeries::doubts() const {
   std::vector<std::string> doubts;
+  std::size_t count = 0;
   for (const MarkDoubt& doubt : markDoubts_) {
-    if (doubt.marker != deleteValue_) doubts.push_back(doubt.text);
+    if (doubt.marker != deleteValue_ && ++count <= kMostDoubts) doubts.push_back(doubt.text);
+  }
+  if (count > kMostDoubts) {
+    doubts.push_back(fmt::format("{}: {} more comments like these", sourceName_, count - kMostDoubts));
   }
   if (itemCount() < 2 || !isHeadingOfHours(itemName(1))) return doubts;
   constexpr std::int64_t kDaySeconds = 86400;
@@ -299,7 +312,7 @@ bool CsvTimeSeries::readCells(std::size_t place, std::vector<Value>& values) {
       values.clear();
       const std::string_view text = csv::cellText(cell, cellEnd);
       return fail(cell, "a number of at most 3.4028235e38 in size, an empty cell, NaN or NA",
-                  quotedForMessage(text) + hintOfTwoColumns(text));
+                  quotedForMessage(text) + hintOfTwoColumns(text) + hintOfDecimalComma(text));
     }
     values.push_back(*slow);
   }

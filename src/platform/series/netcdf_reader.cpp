@@ -218,6 +218,14 @@ class Exchange final {
 
 std::optional<NetcdfReader::Content> NetcdfReader::read(const std::string& path, std::span<const int> items,
                                                         ReadingWatch& watch, std::string& reason) {
+  auto content = readOnce(path, items, watch, reason);
+  // The file may be sound: whoever ends processes (the system, for their memory; an administrator) chose this one.
+  if (!content && helper_.wasKilled()) content = readOnce(path, items, watch, reason);
+  return content;
+}
+
+std::optional<NetcdfReader::Content> NetcdfReader::readOnce(const std::string& path, std::span<const int> items,
+                                                            ReadingWatch& watch, std::string& reason) {
   Exchange exchange(helper_, path, watch, reason);
   if (!exchange.ask(items)) return std::nullopt;
   const Answer& answer = exchange.answer();

@@ -32,11 +32,14 @@ class NetcdfReader final {
   };
 
   /// Opens a file as NetcdfTimeSeries does, reads these items, given by their numbers, as far as it has them, and
-  /// closes it. Empty, with "file: why", when that fails.
+  /// closes it. Empty, with "file: why", when that fails. Once more if something else has killed the process.
   std::optional<Content> read(const std::string& path, std::span<const int> items, ReadingWatch& watch,
                               std::string& reason);
 
  private:
+  std::optional<Content> readOnce(const std::string& path, std::span<const int> items, ReadingWatch& watch,
+                                  std::string& reason);
+
   HelperProcess helper_;
 };
 

@@ -34,6 +34,25 @@ std::vector<std::string> SetupSchema::sectionNamesInside(std::string_view path) 
   return names;
 }
 
+std::vector<std::string> SetupSchema::sectionsWith(std::string_view keyword) const {
+  std::vector<std::string> paths;
+  for (const SectionRow* row : sections_) {
+    if (findKeyword(row->path, keyword) != nullptr) paths.emplace_back(row->path);
+  }
+  return paths;
+}
+
+std::vector<std::string> SetupSchema::sectionsThatHold(std::string_view section) const {
+  std::vector<std::string> paths;
+  for (const SectionRow* row : sections_) {
+    const auto slash = row->path.rfind('/');
+    const bool isTop = slash == std::string_view::npos;
+    if ((isTop ? row->path : row->path.substr(slash + 1)) != section) continue;
+    paths.emplace_back(isTop ? kSetupTarget : row->path.substr(0, slash));
+  }
+  return paths;
+}
+
 std::string itemPattern(std::string_view name) {
   const auto underscore = name.rfind('_');
   if (underscore == std::string_view::npos) return std::string(name);

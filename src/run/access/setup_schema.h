@@ -24,6 +24,11 @@ class SetupSchema final {
   const KeywordRow* findKeyword(std::string_view section, std::string_view name) const;
   /// The names of the sections directly inside `path` (empty: of the target), item numbers as `n`.
   std::vector<std::string> sectionNamesInside(std::string_view path) const;
+  /// The paths of the sections that have a keyword of this name.
+  std::vector<std::string> sectionsWith(std::string_view keyword) const;
+  /// The paths of those directly inside which is a section of this name, with its item number as `n`; that of the
+  /// target is its name.
+  std::vector<std::string> sectionsThatHold(std::string_view section) const;
 
  private:
   std::vector<const SectionRow*> sections_;

@@ -30,6 +30,7 @@ bool RunLog::open(const std::string& path, std::string& reason) {
   path_ = path;
   descriptor_ = descriptor;
   isClosed_ = false;
+  head_.clear();
   const std::string earlier = std::move(pending_);
   pending_.clear();
   write(earlier);
@@ -86,14 +87,11 @@ void RunLog::write(std::string_view record) {
   }
   putBackIfRemoved(descriptor_, path_);  // if that fails, the log and the run go on all the same
   // What a model prints and what files are called may be in any encoding.
-  const std::string text = unwrittenHead_ + withValidUtf8(record);
-  const int error = writeWhole(descriptor_, text).error;
-  if (error == 0) {
-    unwrittenHead_.clear();
-    return;
-  }
-  if (writeError_.empty()) writeError_ = std::strerror(error);
-  if (unwrittenHead_.empty() && ::lseek(descriptor_, 0, SEEK_END) == 0) unwrittenHead_ = record;
+  const std::string text = withValidUtf8(record);
+  const bool isEmpty = ::lseek(descriptor_, 0, SEEK_END) == 0;
+  const int error = writeWhole(descriptor_, isEmpty ? head_ + text : text).error;
+  if (error != 0 && writeError_.empty()) writeError_ = std::strerror(error);
+  if (head_.empty()) head_ = text;
 }
 
 }  // namespace mirevo

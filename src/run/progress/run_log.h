@@ -61,8 +61,10 @@ class RunLog final {
   int descriptor_ = -1;
   bool isClosed_ = false;
   std::string path_;
-  std::string pending_;        ///< lines written before the file was open
-  std::string unwrittenHead_;  ///< the first record, by which a log is known as one, while the disk has no room for it
+  std::string pending_;  ///< lines written before the file was open
+  /// The first record, by which a log is known as one: written again where the disk had no room for it, or something
+  /// has emptied the file.
+  std::string head_;
   std::function<void(std::string_view)> listener_;
   std::vector<std::string> warnings_;
   int warningCount_ = 0;

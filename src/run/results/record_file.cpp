@@ -3,6 +3,7 @@
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
+#include <ctime>
 #include <fcntl.h>
 #include <filesystem>
 #include <sys/stat.h>
@@ -12,6 +13,7 @@
 
 #include <fmt/core.h>
 
+#include "common/descriptor.h"
 #include "common/descriptor_output.h"
 #include "common/fatal_error.h"
 #include "common/file_copy.h"
@@ -90,7 +92,9 @@ bool RecordFile::tryAppend(std::string_view record, std::string& reason) {
   }
   const EndingSignalsHeld held;  // so that a signal's closing line follows a whole record
   if (!putBackIfRemoved(descriptor_, path_)) {
-    reason = std::string("it was removed and cannot be put back: ") + std::strerror(errno);
+    reason = errno == EEXIST ? "another program has replaced it with another file. With Restart = 1 the setup goes on "
+                               "from what is in that and makes the other evaluations again"
+                             : std::string("it was removed and cannot be put back: ") + std::strerror(errno);
     failed_ = true;
     return false;
   }
@@ -117,6 +121,14 @@ bool RecordFile::tryAppend(std::string_view record, std::string& reason) {
 bool RecordFile::takeUpSize(std::string& reason) {
   struct stat status {};
   if (::fstat(descriptor_, &status) != 0 || !S_ISREG(status.st_mode)) return true;
+  // A network file system may show an earlier size for a while, until the file is opened anew.
+  constexpr int kMoreLooks = 10;
+  constexpr timespec kPause{0, 100'000'000};
+  for (int look = 0; look < kMoreLooks && status.st_size < size_; ++look) {
+    ::nanosleep(&kPause, nullptr);
+    const Descriptor again(::open(path_.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
+    if (::fstat(descriptor_, &status) != 0) return true;
+  }
   if (status.st_size < size_) {
     reason = shortenedText(size_, status.st_size);
     return false;

@@ -1,8 +1,11 @@
 #include "run/results/restart.h"
 
 #include <algorithm>
+#include <cerrno>
 #include <iterator>
+#include <set>
 #include <span>
+#include <sys/stat.h>
 #include <utility>
 
 #include <fmt/core.h>
@@ -24,6 +27,7 @@ constexpr std::string_view kRefusal = "Error: Unable to continue the earlier run
 constexpr std::string_view kRemedy = "Restart = 0 starts afresh and keeps the earlier results under a numbered name.";
 constexpr std::size_t kMostChangesShown = 20;
 constexpr std::size_t kMostRowsShown = 20;
+constexpr double kSettingsSeconds = 1.0;  ///< between looks whether their file is there
 
 [[noreturn]] void refuse(std::string_view detail) {
   fatalError(kRefusal, fmt::format("{}\n{}", detail, kRemedy));
@@ -71,11 +75,20 @@ void requireSameSettings(const RestartSettings& then, const RestartSettings& now
   refuse(detail);
 }
 
+/// How many of the lines that are no rows were some, as far as can be told: of evaluations of which no row is left. The
+/// others are none of the run's.
+std::size_t countDamagedRows(const ResultTable& table, const RowChecksums& checksums, int planned) {
+  std::set<int> numbers = table.numbersOfUnusable;
+  for (const auto& [number, checksum] : checksums) numbers.insert(number);
+  for (const ResultRow& row : table.rows) numbers.erase(row.number);
+  const auto count = std::distance(numbers.lower_bound(1), numbers.upper_bound(std::max(planned, 0)));
+  return std::min(table.unusableLines, static_cast<std::size_t>(count));
+}
+
 /// Rows that cannot be read are made again; one that can be read and does not hold would have been believed, and only
 /// the user can tell what it was. Returns how many rows have no checksum.
-std::size_t requireRowsThatHold(const std::vector<ResultRow>& rows, const RestartFiles& files,
-                                const RunConfig& config) {
-  const RowChecksums checksums = readRowChecksums(readFileIfThere(files.checksums).value_or(""));
+std::size_t requireRowsThatHold(const std::vector<ResultRow>& rows, const RowChecksums& checksums,
+                                const RestartFiles& files, const RunConfig& config) {
   const CheckedRows checked = checkRows(rows, checksums, config, RowOrigin::thisSetup);
   if (checked.faults.empty()) return checked.withoutChecksum;
   std::string detail = fmt::format("{} has rows that do not hold:", files.results);
@@ -137,13 +150,19 @@ std::optional<EarlierRun> earlierRunIn(const std::string& text, const RestartFil
     refuse(files.results + " has other columns than the setup asks for", files.results, run_files::kPlain.results);
   }
 
-  const std::size_t withoutChecksum = requireRowsThatHold(table.rows, files, config);
+  const RowChecksums checksums = readRowChecksums(readFileIfThere(files.checksums).value_or(""));
+  const std::size_t withoutChecksum = requireRowsThatHold(table.rows, checksums, files, config);
+  const std::size_t damaged = countDamagedRows(table, checksums, config.plannedModelRuns());
   if (!record) record = recordOfEarlierVersion(table);
   EarlierRun run{std::move(table.rows), std::move(record->started), std::move(record->restarted), then.searches, {}};
   putInOrder(run.rows);
-  if (table.unusableLines > 0) {
+  if (damaged > 0) {
     run.notes.push_back(
-        fmt::format("Rows of {} that were cut off or damaged are made again: {}", files.results, table.unusableLines));
+        fmt::format("Rows of {} that were cut off or damaged are made again: {}", files.results, damaged));
+  }
+  if (table.unusableLines > damaged) {
+    run.notes.push_back(fmt::format("Lines of {} that are no rows of this run are passed over: {}", files.results,
+                                    table.unusableLines - damaged));
   }
   if (withoutChecksum > 0) {
     run.notes.push_back(
@@ -217,11 +236,29 @@ int firstWithoutPairs(std::span<const ResultRow> rows, const PairsByNumber& pair
   return isKnown || count == 0 ? 0 : first->number;
 }
 
-void writeRestartSettings(const std::string& path, const RunConfig& config) {
+void RestartSettingsFile::write(const RunConfig& config) {
+  text_ = formatRestartSettings(restartSettings(config));
+  nextLook_ = clock_() + kSettingsSeconds;
   std::string reason;
-  if (!replaceFile(path, formatRestartSettings(restartSettings(config)), reason)) {
-    fatalError("Error: Unable to write to " + path, reason);
-  }
+  if (!replaceFile(path_, text_, reason)) fatalError("Error: Unable to write to " + path_, reason);
+}
+
+std::string RestartSettingsFile::keep() {
+  std::string reason;
+  if (hasFailed_ || text_.empty() || clock_() < nextLook_) return {};
+  nextLook_ = clock_() + kSettingsSeconds;
+  hasFailed_ = !putBack(reason);
+  return hasFailed_ ? fmt::format(
+                          "{} was removed and cannot be written again: {}. Without it the run cannot be "
+                          "continued if it is interrupted",
+                          path_, reason)
+                    : std::string();
+}
+
+bool RestartSettingsFile::putBack(std::string& reason) const {
+  struct stat status {};
+  const bool isMissing = ::lstat(path_.c_str(), &status) != 0 && errno == ENOENT;
+  return text_.empty() || !isMissing || replaceFile(path_, text_, reason);
 }
 
 }  // namespace mirevo

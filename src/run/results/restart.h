@@ -1,12 +1,15 @@
 #pragma once
 
 #include <cstddef>
+#include <functional>
 #include <map>
 #include <optional>
 #include <span>
 #include <string>
+#include <utility>
 #include <vector>
 
+#include "common/clock.h"
 #include "evaluation/earlier_evaluations.h"
 #include "run/results/pairs_file.h"
 #include "run/results/result_table.h"
@@ -60,7 +63,29 @@ std::map<int, EarlierEvaluations::Record> earlierRecords(EarlierRun& run,
 /// `count` of it, and of none before it; otherwise 0.
 int firstWithoutPairs(std::span<const ResultRow> rows, const PairsByNumber& pairs, std::size_t count);
 
-/// Writes the settings of this run. Throws FatalError.
-void writeRestartSettings(const std::string& path, const RunConfig& config);
+/// The settings of a run on disk. Without them its rows cannot be taken up, so they are there as long as it goes on.
+class RestartSettingsFile final {
+ public:
+  using Clock = std::function<double()>;
+  explicit RestartSettingsFile(std::string path, Clock clock = runTimeClock)
+      : path_(std::move(path)), clock_(std::move(clock)) {}
+
+  /// Throws FatalError.
+  void write(const RunConfig& config);
+  /// To be called now and then: writes the file again if something has removed it, which is looked for once a second.
+  /// Returns a warning where that fails, once.
+  std::string keep();
+  /// The same at once, for the end of a run. False, with the system's reason, when that fails.
+  bool putBack(std::string& reason) const;
+
+  const std::string& path() const { return path_; }
+
+ private:
+  std::string path_;
+  Clock clock_;
+  std::string text_;
+  double nextLook_ = 0.0;
+  bool hasFailed_ = false;
+};
 
 }  // namespace mirevo

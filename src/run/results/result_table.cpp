@@ -9,6 +9,11 @@
 namespace mirevo {
 namespace {
 
+void noteUnusable(std::string_view line, ResultTable& table) {
+  ++table.unusableLines;
+  if (const auto number = parseInteger(line.substr(0, line.find('\t')))) table.numbersOfUnusable.insert(*number);
+}
+
 /// Reads the line of a row; false if it is damaged.
 bool takeRow(std::string_view line, std::size_t lineNumber, std::size_t columnCount, const ResultColumns& columns,
              ResultTable& table) {
@@ -33,7 +38,7 @@ ResultTable readResultTable(std::string_view text, const ResultColumns& columns)
     const std::size_t end = text.find('\n');
     const std::string_view line = trimTrailing(text.substr(0, end));
     if (end == std::string_view::npos) {
-      ++table.unusableLines;
+      noteUnusable(line, table);
       return table;
     }
     text.remove_prefix(end + 1);
@@ -41,7 +46,7 @@ ResultTable readResultTable(std::string_view text, const ResultColumns& columns)
     if (line.front() == '#') {
       (table.hasHeader ? table.closingLines : table.headLines).emplace_back(trim(line.substr(1)));
     } else if (table.hasHeader) {
-      if (!takeRow(line, lineNumber, columnCount, columns, table)) ++table.unusableLines;
+      if (!takeRow(line, lineNumber, columnCount, columns, table)) noteUnusable(line, table);
     } else if (isResultHeader(line)) {
       table.hasHeader = true;
       columnCount = cellCount(line);

@@ -63,6 +63,7 @@ RunResults::RunResults(const RunConfig& config, const SearchSpace& space, const 
       columns_(resultColumns(config, space)),
       names_(namesOf(config)),
       files_(restartFiles(filePrefix, names_)),
+      settings_(files_.settings),
       table_(files_.checksums, tableHead_),
       failedRuns_({pathBeside(filePrefix, run_files::kFailedRuns), files_.failures}, config.setupName, space.names,
                   tableHead_),
@@ -99,8 +100,23 @@ void RunResults::open(const RunConfig& config, std::span<const ObservedSeries> o
   } else {
     if (config.restart != RestartMode::startAfresh)
       log.line("Restart: there are no earlier results to go on from, the run starts afresh");
+    if (config.restart != RestartMode::startAfresh) warnOfLostRows(log);
     startAfresh(config, log);
   }
+}
+
+/// Before what is left is kept under numbered names.
+void RunResults::warnOfLostRows(RunLog& log) const {
+  std::string ignored;
+  std::error_code failed;
+  const std::size_t lost = readRowChecksums(readTextFile(files_.checksums, ignored).value_or("")).size();
+  const std::uintmax_t size = std::filesystem::file_size(files_.results, failed);
+  // A kill may leave one checksum without its row behind a head.
+  if (failed || lost == 0 || (lost == 1 && size > 0)) return;
+  log.warning(
+      fmt::format("{} has no rows, though {} has checksums of {}: something has emptied it, and these "
+                  "evaluations are lost",
+                  files_.results, fileNameOf(files_.checksums), lost));
 }
 
 std::vector<std::string> RunResults::bandPaths(const RunConfig& config) const {
@@ -198,7 +214,7 @@ void RunResults::keepEarlierFiles(const RunConfig& config, RunLog& log) const {
 void RunResults::startAfresh(const RunConfig& config, RunLog& log) {
   keepEarlierFiles(config, log);
   // Before there is a result, so that none is ever without the settings that it depends on.
-  writeRestartSettings(files_.settings, config);
+  settings_.write(config);
   if (simulatedValues_) simulatedValues_->create();
   RunRecord record = recordOf(config, log);
   record.started = dateAndTimeNow();
@@ -274,7 +290,7 @@ void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggreg
   const std::string failedFolders = runFilePath(processFolderPrefix(config), run_files::kFailedFolder);
   for (const std::string& problem : removeFailedRunFolders(failedFolders, failed)) log.warning(problem);
   // With a raised budget in it, rows that the smaller one had ended would be taken for the search's.
-  writeRestartSettings(files_.settings, config);
+  settings_.write(config);
   for (const std::string& note : run.notes) log.line(note);
   if (earlier.unknown > 0) {
     log.line(fmt::format("Restart: why evaluations failed is not known any more of {}: {} does not say it",

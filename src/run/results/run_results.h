@@ -52,6 +52,7 @@ class RunResults final {
   void writeTables(std::span<const DataTable> tables, RunLog& log) const;
 
   ResultFile& table() { return table_; }
+  RestartSettingsFile& settings() { return settings_; }
   FailedRunFile& failedRuns() { return failedRuns_; }
   PairsFile& pairs() { return pairs_; }
   UnkeptFiles& unkeptFiles() { return unkeptFiles_; }
@@ -63,6 +64,7 @@ class RunResults final {
 
  private:
   void lockFailedRuns(RunLog& log);
+  void warnOfLostRows(RunLog& log) const;
   void startAfresh(const RunConfig& config, RunLog& log);
   void keepEarlierFiles(const RunConfig& config, RunLog& log) const;
   /// Account, tables of failures, pairs and checksums, those of analyses.
@@ -81,6 +83,7 @@ class RunResults final {
   ResultColumns columns_;
   ResultFileNames names_;
   RestartFiles files_;
+  RestartSettingsFile settings_;
   std::optional<EarlierRun> earlierRun_;
   bool earlierRunHasStatistics_ = false;  ///< of an analysis that did not come to its end
   ResultFile table_;

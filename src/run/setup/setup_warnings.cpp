@@ -1,6 +1,6 @@
 #include "run/setup/setup_warnings.h"
 
-#include <fmt/core.h>
+#include <fmt/format.h>
 
 #include "common/text.h"
 #include "platform/equations/expression_evaluator.h"
@@ -10,6 +10,7 @@ namespace {
 
 /// Limits the log if, for instance, every line of a file gives a warning.
 constexpr int kMostWarnings = 50;
+constexpr std::size_t kMostHomes = 3;  ///< of what may be in more sections it is no news where
 constexpr std::string_view kUnusedTimeKeyword = "MaxSimTime";
 
 class EntryCheck final {
@@ -24,7 +25,7 @@ class EntryCheck final {
       const std::string path = pattern.empty() ? name : fmt::format("{}/{}", pattern, name);
       const bool isFirst = node.section(section->name()) == section.get();
       if (file_.schema().findSection(path) == nullptr) {
-        warn(section->position(), "section", section->name(),
+        warn(section->position(), "section", section->name(), file_.schema().sectionsThatHold(name),
              nearestName(section->name(), file_.schema().sectionNamesInside(pattern)));
       } else if (!isFirst) {
         warnRepeated(section->position(), "section", section->name(), node.section(section->name())->position());
@@ -50,16 +51,23 @@ class EntryCheck final {
       if (const SectionRow* section = file_.schema().findSection(pattern)) {
         for (const KeywordRow& other : section->keywords) known.emplace_back(other.name());
       }
-      warn(keyword.position, "keyword", keyword.name, nearestName(keyword.name, known));
+      warn(keyword.position, "keyword", keyword.name, file_.schema().sectionsWith(keyword.name),
+           nearestName(keyword.name, known));
     } else if (row->type != KeywordType::textLines && node.keyword(keyword.name) != &keyword) {
       warnRepeated(keyword.position, "keyword", keyword.name, node.keyword(keyword.name)->position);
     }
   }
 
-  void warn(KdxPosition position, std::string_view kind, const std::string& name,
+  /// `homes`: the sections that may have it.
+  void warn(KdxPosition position, std::string_view kind, const std::string& name, const std::vector<std::string>& homes,
             const std::optional<std::string>& nearest) {
-    report(position, fmt::format("{} {} is unknown and not read{}", kind, quotedForMessage(name),
-                                 nearest ? fmt::format(", did you mean {}?", quotedForMessage(*nearest)) : ""));
+    std::string hint;
+    if (!homes.empty() && homes.size() <= kMostHomes) {
+      hint = fmt::format(" here, it belongs in [{}]", fmt::join(homes, "] or ["));
+    } else if (nearest) {
+      hint = fmt::format(", did you mean {}?", quotedForMessage(*nearest));
+    }
+    report(position, fmt::format("{} {} is unknown and not read{}", kind, quotedForMessage(name), hint));
   }
 
   void warnRepeated(KdxPosition position, std::string_view kind, const std::string& name, KdxPosition first) {

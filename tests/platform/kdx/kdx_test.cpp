@@ -35,6 +35,9 @@ TEST(Kdx, NamesTheFirstPlaceThatIsWrongAndWhatWasExpected) {
        "2:9: expected ',' or the end of the line after a value, found \"'b'\"; write a quote inside a text twice, or "
        "put the text between quotes of the other kind"},
       {"[A]\nx = hello\n", "2:5: expected a number, a date or a text between quotes, found \"hello\""},
+      {"[A]\nx = 01.02.2001\n",
+       "2:5: expected a number, a date or a text between quotes, found \"01.02.2001\"; a date is written as "
+       "2001-01-31"},
       {"[A]\nx = -inf\n", "2:5: expected a number, a date or a text between quotes, found \"-inf\""},
       {"[A]\nx = 1e999\n", "2:5: expected a number, a date or a text between quotes, found \"1e999\""},
       {"[A]\nx = 2001-01-31 12\n", "2:5: expected a number, a date or a text between quotes, found \"2001-01-31 12\""},

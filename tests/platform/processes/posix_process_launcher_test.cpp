@@ -18,6 +18,7 @@
 
 #include "common/run_files.h"
 #include "matchers.h"
+#include "platform/processes/child_guard.h"
 #include "platform/processes/process_folder.h"
 #include "processes.h"
 #include "temporary_folder.h"
@@ -272,14 +273,18 @@ void denyPidfds() {
   if (::prctl(PR_SET_SECCOMP, SECCOMP_MODE_FILTER, &program) != 0) ::_exit(9);
 }
 
-/// Kills the guard of this process; the launcher must tell of it once.
-void killGuard(PosixProcessLauncher& launcher) {
+void signalGuard(int signal) {
   const std::string self = std::to_string(::getpid());
   std::ifstream children("/proc/" + self + "/task/" + self + "/children");
   for (pid_t child = 0; children >> child;) {
     const std::string name = TemporaryFolder::readFile("/proc/" + std::to_string(child) + "/comm");
-    if (name == "mirevo_guard\n") ::kill(child, SIGKILL);
+    if (name == "mirevo_guard\n") ::kill(child, signal);
   }
+}
+
+/// Kills the guard of this process; the launcher must tell of it once.
+void killGuard(PosixProcessLauncher& launcher) {
+  signalGuard(SIGKILL);
   const auto hasTold = [&launcher] {
     launcher.waitForChange(0.01);
     return launcher.takeWarnings().size() == 1;
@@ -290,17 +295,20 @@ void killGuard(PosixProcessLauncher& launcher) {
 TEST_F(PosixProcessLauncherTest, NothingOutlivesTheProgram) {
   // Each way for a program to end, with two slots running a shell, a daemon, a model and a stubborn grandchild each.
   const auto kill = [] { ::kill(::getpid(), SIGKILL); };
+  const auto leave = [] {
+    ::signal(SIGTERM, [](int) {
+      haltProcessesFromSignal();
+      ::_exit(1);
+    });
+    ::raise(SIGTERM);
+  };
+  const auto leaveWithGuard = [&](int signal) { return [=] { (signalGuard(signal), leave()); }; };
   const std::pair<const char*, std::function<void()>> cases[] = {{"kill -9", kill},
                                                                  {"kill -9, first its guard", kill},
                                                                  {"kill -9, without pidfds", kill},
-                                                                 {"leaves from a signal handler",
-                                                                  [] {
-                                                                    ::signal(SIGTERM, [](int) {
-                                                                      haltProcessesFromSignal();
-                                                                      ::_exit(1);
-                                                                    });
-                                                                    ::raise(SIGTERM);
-                                                                  }},
+                                                                 {"leaves from a signal handler", leave},
+                                                                 {"its guard is killed", leaveWithGuard(SIGKILL)},
+                                                                 {"its guard is stopped", leaveWithGuard(SIGSTOP)},
                                                                  {"exits without a word", [] { ::_exit(0); }}};
   initialise(
       "trap '' TERM\nsetsid sh -c 'echo $$ >daemon.txt; exec sleep 600' &\n"

@@ -130,6 +130,10 @@ TEST(CsvTimeSeries, CellsThatAreNoNumbersAreRefused) {
     ASSERT_TRUE(series.parse("s.csv", "time;Q\n2001-01-01;" + std::string(cell) + "\n")) << series.lastError();
     EXPECT_FALSE(series.getData(1)) << cell;
   }
+  CsvTimeSeries commas;
+  ASSERT_TRUE(commas.parse("s.csv", "time;Q\n2001-01-01;12,5\n"));
+  EXPECT_FALSE(commas.getData(1));
+  EXPECT_THAT(commas.lastError(), EndsWith("found \"12,5\"; numbers have a decimal point"));
   CsvTimeSeries hours;
   ASSERT_TRUE(hours.parse("s.csv", "d,h,Q\n2001-01-01,12:30,1\n"));
   EXPECT_FALSE(hours.getData(1));
@@ -182,6 +186,12 @@ TEST(CsvTimeSeries, CommentsThatSeemToMarkMissingValuesAreDoubted) {
     const std::size_t count = *warning == '\0' ? 0 : 1;
     EXPECT_THAT(series.doubts(), AllOf(testing::SizeIs(count), testing::Each(HasSubstr(warning)))) << comment;
   }
+  CsvTimeSeries series;
+  std::string comments;
+  for (int line = 1; line <= 30; ++line) comments += "# missing: -9\n";
+  ASSERT_TRUE(series.parse("s.csv", comments + "time,Q\n"));
+  ASSERT_EQ(series.doubts().size(), 11U);
+  EXPECT_EQ(series.doubts().back(), "s.csv: 20 more comments like these");
 }
 
 TEST(CsvTimeSeries, AHeaderAloneIsAFileWithoutSteps) {

@@ -1,5 +1,6 @@
 #include "platform/series/netcdf_time_series.h"
 
+#include <csignal>
 #include <cstdio>
 #include <filesystem>
 #include <fstream>
@@ -7,6 +8,7 @@
 #include <memory>
 #include <numeric>
 #include <tuple>
+#include <unistd.h>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -14,9 +16,11 @@
 
 #include "common/calendar.h"
 #include "matchers.h"
+#include "platform/processes/helper_process.h"
 #include "platform/series/guarded_netcdf.h"
 #include "platform/series/netcdf_units.h"
 #include "platform/series/shown_values.h"
+#include "temporary_folder.h"
 
 namespace mirevo {
 namespace {
@@ -265,6 +269,24 @@ TEST(GuardedNetcdf, ADamagedFileIsGivenUpAndTheNextOneIsRead) {
   EXPECT_THAT(series.lastError(), EndsWith("it ends within its header: it was not written to its end, or is damaged"));
   EXPECT_TRUE(series.open(MIREVO_SOURCE_DIR "/tests/platform/series/sound.nc")) << series.lastError();
   EXPECT_THAT(valuesOf(series, 1), ElementsAre(1.0F, 2.0F, 3.0F, 4.0F, 5.0F));
+}
+
+TEST(GuardedNetcdf, AFileWhoseReaderIsKilledIsReadOnceMore) {
+  const std::string files = MIREVO_SOURCE_DIR "/tests/platform/series/";
+  const TemporaryFolder folder;
+  const std::string link = folder / "simulated.nc";
+  std::filesystem::create_symlink(files + "endless.nc", link);
+  const auto reading = std::make_shared<SeriesReading>();
+  reading->watch.begin(20.0, "20 seconds", [&] {
+    std::ifstream children(fmt::format("/proc/self/task/{}/children", ::getpid()));
+    for (pid_t child = 0; children >> child;) {
+      if (isHelperProcess(child)) ::kill(child, SIGKILL);
+    }
+    std::filesystem::remove(link);
+    std::filesystem::create_symlink(files + "sound.nc", link);
+  });
+  GuardedNetcdf series(reading);
+  EXPECT_TRUE(series.open(link)) << series.lastError();
 }
 
 TEST(NetcdfTimeSeries, FilesThatAreNoneOrCutOffAreRefused) {

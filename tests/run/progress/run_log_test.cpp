@@ -61,6 +61,14 @@ TEST_F(RunLogTest, AHeadThatTheDiskHadNoRoomForComesLater) {
   EXPECT_EQ(log_.writeError(), "File too large");
 }
 
+TEST_F(RunLogTest, OneThatIsEmptiedUnderWayHasItsHeadAgain) {
+  ASSERT_TRUE(log_.open(path_, reason_)) << reason_;
+  for (const char* text : {"Mirevo 1.2", "lost"}) log_.line(text);
+  std::filesystem::resize_file(path_, 0);
+  for (const char* text : {"next", "last"}) log_.line(text);
+  EXPECT_EQ(content(), "Mirevo 1.2\nnext\nlast\n");
+}
+
 TEST_F(RunLogTest, RecordsOfAnotherWriterAreNotOverwritten) {
   ASSERT_TRUE(log_.open(path_, reason_)) << reason_;
   log_.line("first");

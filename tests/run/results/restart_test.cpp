@@ -107,6 +107,22 @@ TEST_F(RestartSettingsTest, ACutOrDamagedFileIsNotTakenForSettings) {
   }
 }
 
+TEST_F(RestartSettingsTest, AFileThatIsRemovedDuringTheRunIsPutBack) {
+  double now = 0.0;
+  RestartSettingsFile file(folder_ / "settings.dat", [&now] { return now; });
+  file.write(read());
+  const std::string written = folder_.read("settings.dat");
+  const auto isThereAt = [&](double time) {
+    std::filesystem::remove(folder_ / "settings.dat");
+    now = time;
+    EXPECT_EQ(file.keep(), "");
+    return folder_.exists("settings.dat");
+  };
+  EXPECT_FALSE(isThereAt(0.5));
+  EXPECT_TRUE(isThereAt(1.5));
+  EXPECT_EQ(folder_.read("settings.dat"), written);
+}
+
 /// A run whose result file holds the rows that a test gives it.
 class EarlierRunTest : public SetupFixture {
  protected:
@@ -120,13 +136,14 @@ class EarlierRunTest : public SetupFixture {
   std::string taken(const RunConfig& then, const RunConfig& now, const std::string& rows) {
     const RestartFiles files = restartFiles(folder_ / "setup", run_files::kOptimisation);
     folder_.write("setup_Optimisation.dat", "# Started: then\n# Restarted: later\n" + std::string(kHeader) + rows);
-    writeRestartSettings(files.settings, then);
+    RestartSettingsFile(files.settings).write(then);
     try {
       const auto run = findEarlierRun(files, now, {{"Depth", "Rate"}, {"Flow error", "Written"}, {"Flow"}}, record_);
       if (!run) return "nothing";
       EXPECT_EQ(run->started, record_ ? record_->started : "then");
       EXPECT_THAT(run->restarted, ElementsAre("later"));
       searches_ = run->searches;
+      notes_ = run->notes;
       std::string numbers;
       for (const ResultRow& entry : run->rows) numbers += std::to_string(entry.number) + " ";
       return numbers;
@@ -137,6 +154,7 @@ class EarlierRunTest : public SetupFixture {
 
   std::optional<RunRecord> record_;  ///< none: of a version of the program that left none
   std::vector<EarlierSearch> searches_;
+  std::vector<std::string> notes_;
 };
 
 TEST_F(EarlierRunTest, RowsThatTheRunGoesOnFrom) {
@@ -148,6 +166,10 @@ TEST_F(EarlierRunTest, RowsThatTheRunGoesOnFrom) {
   record_.emplace().started = "the day before";
   record_->restarted = {"later"};
   EXPECT_EQ(taken(config, config, rows + "6\tOK\t400\t0"), "1 2 3 4 5 ");
+  EXPECT_THAT(notes_, ElementsAre(HasSubstr("damaged are made again: 1"), HasSubstr("no checksum")));
+  EXPECT_EQ(taken(config, config, rows + "6\tOK\t400\t0\nof another\n5\tOK\n99\tOK\n"), "1 2 3 4 5 ");
+  EXPECT_THAT(notes_, ElementsAre(HasSubstr("made again: 1"), HasSubstr("no rows of this run are passed over: 3"),
+                                  HasSubstr("no checksum")));
   EXPECT_EQ(taken(config, config, rows + row(30) + row(31)), "1 2 3 4 5 30 31 ");
   config.restart = RestartMode::goOnAndRepeatFailed;
   EXPECT_EQ(taken(config, config, rows), "1 2 ");

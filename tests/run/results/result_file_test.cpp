@@ -4,6 +4,7 @@
 #include <cmath>
 #include <csignal>
 #include <sys/resource.h>
+#include <thread>
 #include <tuple>
 
 #include <gmock/gmock.h>
@@ -140,6 +141,23 @@ TEST_F(ResultFileTest, OneThatAnotherProgramHasShortenedTakesNoMoreRows) {
     EXPECT_THAT(reason_, testing::HasSubstr("another program has shortened it, from "));
     EXPECT_EQ(folder_.read("r.dat").size(), 60U);
   }
+}
+
+TEST_F(ResultFileTest, OneThatSeemsShorterForAMomentIsNot) {
+  open();
+  add(success(1, 1, 1), 1);
+  const std::string text = folder_.read("r.dat");
+  std::filesystem::resize_file(path_, 60);
+  std::thread mend([&] { folder_.write("r.dat", text); });
+  add(success(2, 1, 1), 1);
+  mend.join();
+  EXPECT_EQ(folder_.read("r.dat"), text + "2\tOK\t1\t1\t1\t1\n");
+}
+
+TEST_F(ResultFileTest, OneThatAnotherFileReplacesIsNotCalledRemoved) {
+  open();
+  std::filesystem::rename(folder_.write("other", ""), path_);
+  EXPECT_THAT(refusalOf([this] { add(success(1, 1, 1), 1); }), testing::HasSubstr("another program has replaced it"));
 }
 
 TEST_F(ResultFileTest, WhatAnotherProgramAppendsStays) {

@@ -229,6 +229,10 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatAreSeldomMeant)
       {"[/MIREVO_PARAMETERS] => [/MIREVO_PARAMETERS][MIREVO_PARAMETERS][/MIREVO_PARAMETERS]",
        "a second [MIREVO_PARAMETERS] is not read"},
       {"[SCENARIOS] => [TMEMPARAM]\nTmemOption = 1\n[/TMEMPARAM][SCENARIOS]", ""},
+      {"[SCENARIOS] => [SCENARIOS]\nTmemOption = 1\n[TMEMPARAM]\n[/TMEMPARAM]",
+       "setup.kdx:104:1: keyword \"TmemOption\" is unknown and not read here, it belongs in [TMEMPARAM]\n"},
+      {"[SCENARIOS] => [SCENARIOS]\n[TMEMPARAM]\n[/TMEMPARAM]",
+       "setup.kdx:104:1: section \"TMEMPARAM\" is unknown and not read here, it belongs in [MIREVO_PARAMETERS]\n"},
       {"[SCENARIOS] => [TMEMPARAM]\nMaxSimTime = 60.0\n[/TMEMPARAM][SCENARIOS]",
        "setup.kdx:104:1: keyword \"MaxSimTime\" is not used; MaxSimulationTime in [SimultaneousSimulations] limits the "
        "time of a model run"},
