@@ -14,7 +14,7 @@
 #include "common/text.h"
 #include "common/version.h"
 #include "platform/jobs/job_launcher.h"
-#include "platform/jobs/mpi_support.h"
+#include "platform/jobs/mpi_module.h"
 #include "platform/terminal/front_end.h"
 #include "platform/terminal/terminal.h"
 #include "report/library_versions.h"

@@ -18,21 +18,24 @@ namespace {
 constexpr const char* kCannotJoin = "Error: Mirevo cannot take part in this MPI job";
 constexpr std::string_view kRemedy =
     "A job launcher (mpirun, srun) has started this process as one of several, which would all do the same run. "
-    "Install "
-    "the package mirevo-mpi, or Mirevo from a build with MIREVO_MPI=ON; or start it without the launcher.";
+    "Install the package mirevo-mpi, or Mirevo from a build with MIREVO_MPI=ON; or start it without the launcher.";
 
 /// Where the module may be, relative to the folder of the program: installed, and in the build tree.
 constexpr std::array<const char*, 2> kModules = {MIREVO_MODULE_FOLDER "/mirevo-mpi.so", "lib/mirevo/mirevo-mpi.so"};
 
-std::filesystem::path findModule() {
+struct ModuleFile {
+  std::filesystem::path path;  ///< if it is not there, where it should be
+  bool exists = false;
+};
+
+ModuleFile findModule() {
   std::error_code failure;
   const auto program = std::filesystem::read_symlink("/proc/self/exe", failure);
+  const auto pathOf = [&](const char* name) { return (program.parent_path() / name).lexically_normal(); };
   for (const char* name : kModules) {
-    auto path = (program.parent_path() / name).lexically_normal();
-    if (::access(path.c_str(), F_OK) == 0) return path;
+    if (::access(pathOf(name).c_str(), F_OK) == 0) return {pathOf(name), true};
   }
-  fatalError(kCannotJoin, fmt::format("Its part for MPI is not installed: {} does not exist. {}",
-                                      (program.parent_path() / kModules[0]).lexically_normal().string(), kRemedy));
+  return {pathOf(kModules[0]), false};
 }
 
 /// The address of a symbol of the module.
@@ -43,8 +46,17 @@ void* symbolOf(void* module, const char* name, const std::filesystem::path& path
 
 }  // namespace
 
+std::string mpiSupport() {
+  const ModuleFile module = findModule();
+  return module.exists ? "yes, by " + module.path.string() : fmt::format("no, {} is not there", module.path.string());
+}
+
 std::unique_ptr<Job> joinMpiJob() {
-  const auto path = findModule();
+  const auto [path, exists] = findModule();
+  if (!exists) {
+    fatalError(kCannotJoin,
+               fmt::format("Its part for MPI is not installed: {} does not exist. {}", path.string(), kRemedy));
+  }
   // Global, since the plugins that OpenMPI loads look for its symbols there. It is never unloaded: the job's code is in
   // it, and what MPI registers for the end of the process.
   void* module = ::dlopen(path.c_str(), RTLD_NOW | RTLD_GLOBAL | RTLD_NODELETE);

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <memory>
+#include <string>
 
 #include "platform/jobs/job.h"
 
@@ -18,6 +19,9 @@ inline constexpr const char* kModuleVersionName = "mirevoModuleVersion";
 /// The module's entry: initialises MPI and returns the job, to be deleted by the caller; null if this process finds
 /// itself alone in it. Throws FatalError when `mirevo::launchedProcessCount()` says that it should not be.
 extern "C" Job* mirevoJoinMpiJob();
+
+/// For people: whether the module is there, and its file.
+std::string mpiSupport();
 
 /// Loads the module and joins the MPI job that a launcher has started; null if this process finds itself alone. Throws
 /// FatalError like joinJob(), and when there is no module.
