@@ -208,7 +208,8 @@ double middleSlopeBias(ValuePairs pairs, double epsilon) {
 
 double lowFlowBias(ValuePairs pairs, double epsilon) {
   if (pairs.observed.empty()) return kNaN;
-  return -percent(lowVolume(pairs.simulated, epsilon), lowVolume(pairs.observed, epsilon));
+  const double observed = lowVolume(pairs.observed, epsilon);
+  return 100.0 * ratio(observed - lowVolume(pairs.simulated, epsilon), observed);
 }
 
 std::vector<double> ranksOf(std::span<const double> values) {

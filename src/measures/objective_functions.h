@@ -25,8 +25,9 @@ struct MeasureTerm {
   double weight = 1.0;                       ///< of the contribution
   double (*contribution)(double) = nullptr;  ///< what a value of the measure counts as; null: as it is
 
-  MeasureTerm(std::size_t measureIndex)
-      : index(measureIndex) {}  // NOLINT(google-explicit-constructor): an index is a plain term
+  // An index is a plain term.
+  // NOLINTNEXTLINE(google-explicit-constructor)
+  MeasureTerm(std::size_t measureIndex) : index(measureIndex) {}
   /// The term of a measure with this index: of a statistic without a code its contribution, with the measure's weight.
   MeasureTerm(std::size_t measureIndex, const OutputMeasure& measure);
 

@@ -30,6 +30,7 @@ struct Statistic {
   bool needsPeaks = false;  ///< it uses the peak or low difference of MeasureStatistics
   /// Of the values before the statistic; of one that has none the setup may choose it.
   ValueTransformation transformation = ValueTransformation::none;
+  bool isOfSizes = false;           ///< ranks would make it the same for any simulation, or nearly so
   bool usesEpsilon = false;         ///< it takes logarithms of values to which MeasureStatistics::epsilon is added
   std::string_view undefined = {};  ///< when its value is NaN, behind "if": "the observed values do not vary"
 };

@@ -26,7 +26,7 @@ double transformedValue(double value, ValueTransformation transformation, double
       return value + epsilon != 0.0 ? 1.0 / (value + epsilon) : kNaN;
     case ValueTransformation::boxCox:
       if (lambda == 0.0) return logarithm(value + epsilon);
-      return value + epsilon > 0.0 ? (std::pow(value + epsilon, lambda) - 1.0) / lambda : kNaN;
+      return std::expm1(lambda * logarithm(value + epsilon)) / lambda;
     case ValueTransformation::none:
     case ValueTransformation::rank:
       break;

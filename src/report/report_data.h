@@ -56,6 +56,7 @@ struct ReportedMeasure {
   std::string statistic;
   double weight = 1.0;
   std::string objective;  ///< empty: none
+  bool isCriterion = false;
   double initial = std::numeric_limits<double>::quiet_NaN();
   double best = std::numeric_limits<double>::quiet_NaN();
 };

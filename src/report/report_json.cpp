@@ -92,6 +92,7 @@ void writeMeasures(JsonWriter& json, const ReportData& data) {
   for (const ReportedMeasure& measure : data.measures) {
     json.beginObject().member("name", measure.name).member("statistic", measure.statistic);
     json.member("weight", measure.weight).optionalMember("objective", measure.objective);
+    if (measure.isCriterion) json.member("isCriterion", true);
     json.member("initial", measure.initial).member("best", measure.best).endObject();
   }
   json.endArray().key("objectives").beginArray();

@@ -248,8 +248,9 @@ const ResultRow* ReportBuilder::rowOf(int number) const {
 void ReportBuilder::addMeasures() {
   for (std::size_t i = 0; i < config_.measures.size(); ++i) {
     const OutputMeasure& measure = config_.measures[i];
-    data_.measures.push_back({measure.name, statisticName(measure), measure.weight, measure.functionName,
-                              valueOf(initial_, &ResultRow::measures, i), valueOf(best_, &ResultRow::measures, i)});
+    data_.measures.push_back({measure.name, statisticWithBest(measure), measure.weight, measure.functionName,
+                              isCriterion(measure), valueOf(initial_, &ResultRow::measures, i),
+                              valueOf(best_, &ResultRow::measures, i)});
   }
   for (std::size_t i = 0; i < config_.objectives.size(); ++i) {
     data_.objectives.push_back({config_.objectives[i].name, valueOf(initial_, &ResultRow::objectives, i),

@@ -362,7 +362,7 @@ std::optional<RunDriver::Unwritten> RunDriver::closeResults(const Ending& ending
   if (reporter_) reporter_->settle(*aggregator_);
   if (series_) series_->finish(reporter_->best());
   std::vector<std::string> lines{ending.closingLine, "Ended: " + ending.time};
-  if (reporter_) addFindings(*reporter_, *aggregator_, parameters_->searchSpace().names, lines);
+  if (reporter_) addFindings(*reporter_, *aggregator_, parameters_->searchSpace().names, config_.measures, lines);
   lines.insert(lines.end(), report.begin(), report.end());
   const EndingSignalsHeld held;
   signalState.resultFileDescriptor = -1;

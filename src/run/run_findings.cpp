@@ -6,11 +6,14 @@
 
 #include "common/text.h"
 #include "evaluation/evaluation_result.h"
+#include "measures/statistics.h"
+#include "run/setup/setup_summary.h"
 
 namespace mirevo {
 
 void addFindings(const RunReporter& reporter, const ObjectiveAggregator& aggregator,
-                 std::span<const std::string> parameterNames, std::vector<std::string>& lines) {
+                 std::span<const std::string> parameterNames, std::span<const OutputMeasure> measures,
+                 std::vector<std::string>& lines) {
   if (reporter.best()) {
     const std::vector<std::string> scales = aggregator.scaleLines();
     lines.insert(lines.end(), scales.begin(), scales.end());
@@ -19,6 +22,10 @@ void addFindings(const RunReporter& reporter, const ObjectiveAggregator& aggrega
     lines.push_back("Best aggregate: " + formatReal(best.aggregate));
     for (std::size_t i = 0; i < parameterNames.size(); ++i) {
       lines.push_back(fmt::format("Best {} = {}", parameterNames[i], formatReal(best.parameterValues[i])));
+    }
+    for (const OutputMeasure& measure : measures) {
+      if (isCriterion(measure))
+        lines.push_back(fmt::format("Statistic of {}: {}", measure.name, statisticWithBest(measure)));
     }
     for (const std::string& text : reporter.differencesOfBest()) lines.push_back("Warning: " + text);
   }

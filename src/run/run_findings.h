@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "measures/objective_functions.h"
+#include "measures/output_measure.h"
 #include "run/results/run_record.h"
 #include "run/run_reporter.h"
 
@@ -12,7 +13,8 @@ namespace mirevo {
 
 /// What a run has found by its end: for the last lines of its result file, ...
 void addFindings(const RunReporter& reporter, const ObjectiveAggregator& aggregator,
-                 std::span<const std::string> parameterNames, std::vector<std::string>& lines);
+                 std::span<const std::string> parameterNames, std::span<const OutputMeasure> measures,
+                 std::vector<std::string>& lines);
 /// ... and for its record.
 void addFindings(const RunReporter& reporter, const ObjectiveAggregator& aggregator,
                  std::span<const ObjectiveFunction> objectives, RunRecord& record);

@@ -45,6 +45,7 @@ export interface Measure {
   statistic: string;
   weight: Maybe;
   objective: string | null;
+  isCriterion?: boolean; // its differences are no shares: an efficiency, a bias in per cent
   initial: Maybe;
   best: Maybe;
 }

@@ -371,7 +371,9 @@ void SetupSection::checkRange(const KeywordRow& row, const BoundSection& section
   if (message.ends_with(' ')) {
     message += section.row->itemName != nullptr ? section.row->itemName(section.settings) : name();
   }
-  refuse(message, row.name(), fmt::format("expected {}, found {}", row.facts.range.text(), formatReal(number)));
+  refuse(message, row.name(),
+         fmt::format("expected {}{}, found {}", row.facts.range.text(), namesWithoutNumber(row.facts.codes),
+                     formatReal(number)));
 }
 
 std::size_t SetupSection::readCount(std::string_view itemPrefix) const {

@@ -158,6 +158,14 @@ std::string wantedCode(std::span<const CodeName> codes) {
   return fmt::format("{} or one of the names {}", wanted(KeywordType::code), names);
 }
 
+std::string namesWithoutNumber(std::span<const CodeName> codes) {
+  std::string names;
+  for (const CodeName& code : codes) {
+    if (!code.code) names += fmt::format("{}'{}'", names.empty() ? " or one of the names " : ", ", code.name);
+  }
+  return names;
+}
+
 std::string nearestCode(std::span<const CodeName> codes, std::string_view written) {
   std::vector<std::string> names;
   for (const CodeName& code : codes) names.emplace_back(code.name);

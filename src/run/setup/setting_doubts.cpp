@@ -109,10 +109,24 @@ void warnOfStatistic(const OutputMeasure& measure, const SetupSection& section) 
   }
 }
 
+/// Of a measure that the model computes itself.
+void warnOfModelsNumber(const OutputMeasure& measure, const SetupSection& section) {
+  constexpr std::string_view kReason = "has no effect with Interface_Type = 1: the model's number is taken as it is";
+  if (!statisticOf(measure.statisticType).key.code) {
+    section.warn("Statistic_Type", fmt::format("{}, and a search makes it small", kReason));
+  }
+  for (const std::string_view keyword : {"Transformation", "Epsilon", "Box_Cox_Lambda"}) {
+    if (section.isWritten(keyword)) section.warn(keyword, std::string(kReason));
+  }
+}
+
 void warnOfMeasures(const RunConfig& config, const SectionsRead& sections) {
   for (std::size_t i = 0; i < config.measures.size(); ++i) {
     const OutputMeasure& measure = config.measures[i];
-    if (measure.interfaceType != InterfaceType::timeSeries) continue;
+    if (measure.interfaceType != InterfaceType::timeSeries) {
+      warnOfModelsNumber(measure, sections.measures[i]);
+      continue;
+    }
     warnOfStatistic(measure, sections.measures[i]);
     if (isSameFile(measure.simulation.fileName, measure.observation.fileName)) {
       sections.measures[i].warn("Name",

@@ -12,10 +12,10 @@
 namespace mirevo {
 namespace {
 
-/// Statistics that do not weigh differences have one weight, and a best value that is not always 0.
+/// Statistics that do not weigh differences have one weight.
 std::string weightText(const OutputMeasure& measure) {
   if (!isCriterion(measure)) return fmt::format("weight {} (above {})", measure.weight, measure.weightAbove);
-  return fmt::format("best {}, weight {}", bestValue(measure), measure.weight);
+  return fmt::format("weight {}", measure.weight);
 }
 
 /// Writes the summary line by line.
@@ -52,7 +52,7 @@ class Summary final {
     line("Evaluation period: {} to {}", formatDate(config_.period.start), formatDate(config_.period.end));
     line("Output measures: {}", config_.measures.size());
     for (const OutputMeasure& measure : config_.measures) {
-      line("  {}: {}, {}, objective function {}", measure.name, statisticName(measure), weightText(measure),
+      line("  {}: {}, {}, objective function {}", measure.name, statisticWithBest(measure), weightText(measure),
            measure.functionName.empty() ? "none" : measure.functionName);
     }
     line("Objective functions: {}", config_.objectives.size());
@@ -87,6 +87,10 @@ class Summary final {
 std::string statisticName(const OutputMeasure& measure) {
   if (measure.interfaceType == InterfaceType::measureFile) return "written by the model";
   return describeStatistic(measure);
+}
+
+std::string statisticWithBest(const OutputMeasure& measure) {
+  return statisticName(measure) + (isCriterion(measure) ? fmt::format(", best {}", bestValue(measure)) : "");
 }
 
 std::string setupSummary(const RunConfig& config, const SearchSpace& space, std::span<const int> evaluationOrder) {

@@ -91,12 +91,18 @@ std::optional<SettingRefusal> validateMeasurementNumber(const OutputMeasure& mea
 
 std::optional<SettingRefusal> validateValueTransformation(const OutputMeasure& measure) {
   const Statistic& statistic = statisticOf(measure.statisticType);
-  const bool hasOwn = statistic.transformation != ValueTransformation::none;
-  if (measure.transformation == ValueTransformation::none || (!hasOwn && !statistic.needsPeaks)) return std::nullopt;
+  if (measure.transformation == ValueTransformation::none) return std::nullopt;
+  std::string_view reason;
+  if (statistic.transformation != ValueTransformation::none || statistic.usesEpsilon) {
+    reason = "has a transformation of its own";
+  } else if (statistic.needsPeaks) {
+    reason = "is that of extremes, use 'peak error' or a bias instead";
+  } else if (measure.transformation == ValueTransformation::rank && statistic.isOfSizes) {
+    reason = "is hardly changed by the model once the values are ranks";
+  }
+  if (reason.empty()) return std::nullopt;
   return SettingRefusal{"Error: Transformation invalid for output measure " + measure.name, "Transformation",
-                        fmt::format("the statistic '{}' {}", statistic.key.name,
-                                    hasOwn ? "has a transformation of its own"
-                                           : "is that of extremes, use 'peak error' or a bias instead")};
+                        fmt::format("the statistic '{}' {}", statistic.key.name, reason)};
 }
 
 std::optional<SettingRefusal> validateObjectiveFunction(const ObjectiveFunction& function, NamesUsed& names) {

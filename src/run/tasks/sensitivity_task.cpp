@@ -65,6 +65,17 @@ struct ComparedValues {
   std::vector<std::vector<double>> simulated;  ///< empty for a set that failed
 };
 
+bool isInObjective(const TaskContext& context, std::size_t measure) {
+  return std::ranges::any_of(context.objectives, [measure](const ObjectiveFunction& objective) {
+    return std::ranges::any_of(objective.measures,
+                               [measure](const MeasureTerm& term) { return term.index == measure; });
+  });
+}
+
+bool hasWeight(const OutputMeasure& measure) {
+  return measure.weight != 0.0 || (measure.weightAbove != 0.0 && !isCriterion(measure));
+}
+
 /// Every pair of series that enters an objective function, once, however many measures compare it. The weight of an
 /// observation is the square of the measure's weight for its difference, as in a sum of squares.
 ComparedValues compareSeries(const TaskContext& context, std::span<const EvaluationResult> results) {
@@ -76,15 +87,15 @@ ComparedValues compareSeries(const TaskContext& context, std::span<const Evaluat
   for (const ObservedSeries& series : context.observedSeries) {
     const std::size_t count = series.values.size();
     const std::size_t begin = std::exchange(first, first + 2 * count);  // values, then their units
-    const bool counts =
-        std::any_of(context.objectives.begin(), context.objectives.end(), [&](const ObjectiveFunction& objective) {
-          return std::any_of(objective.measures.begin(), objective.measures.end(),
-                             [&](const MeasureTerm& term) { return term.index == series.measure; });
-        });
     const OutputMeasure& measure = measures[series.measure];
-    const bool isRepeated = std::any_of(taken.begin(), taken.end(),
-                                        [&](std::size_t other) { return isSamePair(measure, measures[other]); });
-    if (!counts || isRepeated) continue;
+    const auto isSame = [&](std::size_t other) { return isSamePair(measure, measures[other]); };
+    const bool isRepeated = std::any_of(taken.begin(), taken.end(), isSame);
+    // One of weight 0, which only shows a value, leaves the pair to another that weighs it.
+    const bool isLeft =
+        !hasWeight(measure) && std::ranges::any_of(context.observedSeries, [&](const ObservedSeries& other) {
+          return isSame(other.measure) && hasWeight(measures[other.measure]) && isInObjective(context, other.measure);
+        });
+    if (!isInObjective(context, series.measure) || isRepeated || isLeft) continue;
     taken.push_back(series.measure);
     // The run that shows most digits tells the unit: in another one all values may end with zeros.
     std::vector<double> units(count, std::numeric_limits<double>::quiet_NaN());

@@ -165,8 +165,9 @@ export function resultSection(data: ReportData): Section | null {
   if (data.measures.length > 0) {
     content.push(heading('Output measures'), table(
       [{ title: 'Output measure' }, { title: 'Statistic' }, { title: 'Objective function' }, { title: 'Weight', number: true }, ...values],
-      data.measures.map(({ name, statistic, objective, weight, initial, best }) =>
-        [name, statistic, objective ?? kMissing, number(weight), number(initial, 6), number(best, 6), change(initial, best)]),
+      data.measures.map(({ name, statistic, objective, weight, isCriterion, initial, best }) =>
+        [name, statistic, objective ?? kMissing, number(weight), number(initial, 6), number(best, 6),
+          isCriterion ? kMissing : change(initial, best)]),
       'Output measures'));
   }
   const ranking = rankingTable(data);
