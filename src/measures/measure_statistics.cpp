@@ -287,6 +287,18 @@ double selectStatistic(const MeasureStatistics& statistics, StatisticType type) 
   return statisticOf(type).value(statistics);
 }
 
+double valueOfPerfectFit(const OutputMeasure& measure, const ObservedSeries& observed) {
+  MeasureStatistics statistics;
+  statistics.times = observed.days;
+  statistics.simulatedValues = observed.values;
+  statistics.observedValues = observed.values;
+  statistics.observationCount = observed.values.size();
+  statistics.epsilon = kShareOfMean * std::abs(meanOf(observed.values));
+  transformPairs(measure, statistics);
+  addDifferenceStatistics(Weights<double>{measure.weight, measure.weightAbove}, statistics);
+  return selectStatistic(statistics, measure.statisticType);
+}
+
 double measureValue(const OutputMeasure& measure, const EvaluationPeriod& period, TimeSeriesObject& simulation,
                     TimeSeriesObject& observation, SeriesPrecision precision) {
   return selectStatistic(computeMeasureStatistics(measure, period, simulation, observation, precision),

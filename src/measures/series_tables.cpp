@@ -16,6 +16,7 @@
 #include "common/text.h"
 #include "measures/measure_statistics.h"
 #include "measures/observed_series.h"
+#include "measures/statistics.h"
 #include "platform/series/series_reading.h"
 
 namespace mirevo {
@@ -149,7 +150,10 @@ void SeriesTables::checkItems(std::span<const OutputMeasure> measures, const Eva
     if (observationIndex_[i] == kNoSeries) continue;
     requireItem(observation(i), measures[i].observation);
     const ObservedSeries observed = readObservedSeries(i, measures[i], period, SeriesPrecision::single, observation(i));
-    if (isForRuns) requireObservations(observed, measures[i], period);
+    if (isForRuns) {
+      requireObservations(observed, measures[i], period);
+      requireDefined(observed, measures[i]);
+    }
     warnOfMarkers(observed, measures[i]);
     warnOfDefaultItem(observation(i), measures[i].observation, observationNames_[observationIndex_[i]]);
     // Files in the base folder that have no time steps yet tell nothing about their columns.
@@ -178,6 +182,18 @@ void SeriesTables::requireObservations(const ObservedSeries& observed, const Out
       fmt::format("{}{}\nthe evaluation period is {} to {}\n{}", location,
                   describeLackOfObservations(series, measure.observation.itemNo, name), formatDate(period.start),
                   formatDate(period.end), describeSpan(series, name)));
+}
+
+void SeriesTables::requireDefined(const ObservedSeries& observed, const OutputMeasure& measure) {
+  const bool isAsItIs = measure.transformation == ValueTransformation::none && !isCriterion(measure);
+  if (isAsItIs || std::isfinite(valueOfPerfectFit(measure, observed))) return;
+  const std::string& name = observationNames_[observationIndex_[observed.measure]];
+  fatalError(
+      "Error: Statistic undefined for output measure " + measure.name,
+      fmt::format("{}{}: the {} of item No. {} ({}) in the evaluation period cannot be computed, whatever the "
+                  "model does{}",
+                  measure.observation.fileLocation, name, describeStatistic(measure), measure.observation.itemNo,
+                  observation(observed.measure).itemName(measure.observation.itemNo), describeUndefined(measure)));
 }
 
 void SeriesTables::warnOfMarkers(const ObservedSeries& observed, const OutputMeasure& measure) {

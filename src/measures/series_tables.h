@@ -61,6 +61,8 @@ class SeriesTables final {
   void requireObservations(const ObservedSeries& observed, const OutputMeasure& measure,
                            const EvaluationPeriod& period);
   /// If observations are a usual marker of missing values that is not marked as one.
+  /// Throws FatalError if the statistic cannot be computed for these observations, whatever the model does.
+  void requireDefined(const ObservedSeries& observed, const OutputMeasure& measure);
   /// Of a file with several items of which the setup names none.
   void warnOfDefaultItem(const TimeSeriesObject& series, const SeriesReference& reference, const std::string& name);
   /// Unless it has been given with another location, as for measures that compare the same item.

@@ -9,6 +9,7 @@
 
 #include "common/reading_watch.h"
 #include "matchers.h"
+#include "measures/statistics.h"
 #include "refusal.h"
 #include "temporary_folder.h"
 
@@ -63,6 +64,17 @@ TEST_F(SeriesTablesTest, AnItemThatTheSetupDoesNotNameIsWarnedOfInAFileWithSever
       SeriesTables::MirevoTSobjectInit(std::vector{unnamed, measure("rain.csv", "obs.csv")}, kPeriod).warnings(),
       ElementsAre(HasSubstr("rain.csv has several items, and item No. 1 (P) is compared, as the section has no "
                             "Item_No:\n1: P\n2: Q")));
+}
+
+TEST_F(SeriesTablesTest, ObservationsOfWhichACriterionIsUndefinedEndTheRunBeforeItBegins) {
+  folder_.write("flat.csv", "time,Q\n2001-01-01,2\n2001-01-02,2\n");
+  OutputMeasure nse = measure("sim.csv", "flat.csv");
+  nse.name = "Flow";
+  nse.statisticType = findStatistic("NSE").value();
+  EXPECT_THAT(refusalOf([&] { SeriesTables::MirevoTSobjectInit(std::vector{nse}, kPeriod); }),
+              HasSubstr("cannot be computed, whatever the model does, as it is if the observed values do not vary"));
+  nse.statisticType = findStatistic("mean absolute error").value();
+  EXPECT_NO_THROW(SeriesTables::MirevoTSobjectInit(std::vector{nse}, kPeriod));
 }
 
 TEST_F(SeriesTablesTest, SetupFailuresEndTheRun) {
