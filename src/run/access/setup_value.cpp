@@ -161,7 +161,7 @@ std::string wantedCode(std::span<const CodeName> codes) {
 std::string namesWithoutNumber(std::span<const CodeName> codes) {
   std::string names;
   for (const CodeName& code : codes) {
-    if (!code.code) names += fmt::format("{}'{}'", names.empty() ? " or one of the names " : ", ", code.name);
+    if (!code.code) names += fmt::format("{}'{}'", names.empty() ? "; without a number are " : ", ", code.name);
   }
   return names;
 }
