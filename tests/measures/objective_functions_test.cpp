@@ -7,6 +7,7 @@
 #include <gtest/gtest.h>
 
 #include "matchers.h"
+#include "measures/statistics.h"
 #include "refusal.h"
 
 namespace mirevo {
@@ -17,14 +18,17 @@ ObjectiveFunction function(std::string name, FunctionType type, std::vector<Meas
 }
 
 TEST(ObjectiveFunctions, CombineTheirMeasuresByType) {
+  // 1 - NSE, times the weight.
+  const OutputMeasure nse{.statisticType = findStatistic("NSE").value(), .weight = 4.0};
   const std::vector<ObjectiveFunction> functions{function("sum", FunctionType::sum, {0, 1}),
                                                  function("abs", FunctionType::sumOfAbsolutes, {0, 1}),
                                                  function("sq", FunctionType::sumOfSquares, {0, 1}),
                                                  function("none", FunctionType::sumOfSquares, {}),
                                                  function("unknown", static_cast<FunctionType>(3), {0, 1}),
-                                                 function("twice", FunctionType::sum, {2, 2})};
+                                                 function("twice", FunctionType::sum, {2, 2}),
+                                                 function("criterion", FunctionType::sum, {{0, nse}, {2, nse}})};
   const std::vector<double> measures{-1.0, 2.0, 0.5};
-  EXPECT_THAT(objectiveFunctionValues(functions, measures), ElementsAre(1.0, 3.0, 5.0, 0.0, 0.0, 1.0));
+  EXPECT_THAT(objectiveFunctionValues(functions, measures), ElementsAre(1.0, 3.0, 5.0, 0.0, 0.0, 1.0, 10.0));
 }
 
 TEST(ObjectiveFunctions, AggregateByMethod) {
