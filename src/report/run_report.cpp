@@ -23,6 +23,7 @@
 #include "evaluation/chosen_evaluations.h"
 #include "evaluation/run_comparison.h"
 #include "measures/period_series.h"
+#include "measures/statistics.h"
 #include "parameters/parameter_model.h"
 #include "report/page/page_template.h"
 #include "report/report_analyses.h"
