@@ -28,8 +28,8 @@ std::string faultOfAccess(const std::string& path, int access) {
   return ::access(path.c_str(), access) == 0 ? std::string() : std::strerror(errno);
 }
 
-/// Whether not even its owner may remove the file, as for each run (`chattr +i`).
-bool isImmutable(const std::string& path) {
+/// Whether not even its owner may remove the file, as for each run (`chattr +i`, `chattr +a`).
+bool isUnremovable(const std::string& path) {
   struct statx status {};
   return ::statx(AT_FDCWD, path.c_str(), 0, STATX_TYPE, &status) == 0 &&
          (status.stx_attributes & (STATX_ATTR_IMMUTABLE | STATX_ATTR_APPEND)) != 0;
@@ -37,7 +37,7 @@ bool isImmutable(const std::string& path) {
 
 std::string faultOfParameterFile(const std::string& path) {
   std::string fault = faultOfFile(path);
-  if (fault.empty() && isImmutable(path)) fault = "it is immutable";
+  if (fault.empty() && isUnremovable(path)) fault = "it is immutable or append-only";
   return fault.empty() ? faultOfAccess(folderOf(path), W_OK | X_OK) : fault;
 }
 
@@ -86,15 +86,15 @@ std::optional<FolderDamage> findDamage(const std::string& folder, const FolderNe
 }
 
 std::string givenUpWarning(std::string_view who, const FolderDamage& damage) {
-  return fmt::format("{} is given up and runs no model any more, as its process folder was damaged again. {}", who,
-                     damage.text());
+  return fmt::format("{} is given up and runs no model any more, as its process folder was damaged{}. {}", who,
+                     damage.isFinal ? "" : " again", damage.text());
 }
 
 void failWithoutSlots(const FolderDamage& last) {
   fatalError("Error: " + last.what,
-             last.why +
-                 "\nno process folder is left: the model damages them, and has done so again in one that was made "
-                 "anew");
+             fmt::format(
+                 "{}\nno process folder is left: the model damages them, and {}", last.why,
+                 last.isFinal ? "the last one could not be made anew" : "has done so again in one that was made anew"));
 }
 
 }  // namespace mirevo

@@ -21,8 +21,9 @@ struct FolderNeeds {
 
 /// Why a model cannot be run in a process folder as an earlier run has left it.
 struct FolderDamage {
-  std::string what;  ///< "Unable to open /model/basin_Process1/parameters.txt"
-  std::string why;   ///< "No such file or directory"
+  std::string what;      ///< "Unable to open /model/basin_Process1/parameters.txt"
+  std::string why;       ///< "No such file or directory"
+  bool isFinal = false;  ///< the folder could not be made anew, which `why` tells; else it was, and is damaged again
 
   std::string text() const { return what + ": " + why; }
 };

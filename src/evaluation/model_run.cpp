@@ -239,6 +239,7 @@ std::optional<FolderDamage> ModelRunner::renewIfDamaged(int slot, std::vector<st
   if (files.isRenewed) return damage;
   if (!launcher_.renewFolder(slot)) {
     damage->why += fmt::format("; the process folder could not be made anew: {}", launcher_.lastError());
+    damage->isFinal = true;
     return damage;
   }
   writeConvertedTemplates(slot);

@@ -35,11 +35,12 @@ class FakeLauncher final : public ProcessLauncher {
     return initialiseError.empty();
   }
   bool renewFolder(int slot) override {
+    if (!renewError.empty()) return false;
     std::filesystem::remove_all(getProcessFolder(slot));
     std::filesystem::copy(baseFolder_, getProcessFolder(slot), std::filesystem::copy_options::recursive);
     return true;
   }
-  const std::string& lastError() const override { return initialiseError; }
+  const std::string& lastError() const override { return renewError.empty() ? initialiseError : renewError; }
   std::string getProcessFolder(int slot) const override { return prefix_ + std::to_string(slot); }
 
   void createProcesses(int slot) override {
@@ -95,6 +96,7 @@ class FakeLauncher final : public ProcessLauncher {
   double longestWait = 0.0;
   std::function<void()> onWait;
   std::string initialiseError;
+  std::string renewError;  ///< of renewFolder(), which then fails
   ResistanceUpdate resistanceUpdate = ResistanceUpdate::updated;
   std::vector<std::string> resistanceFiles;
 

@@ -555,6 +555,16 @@ TEST_F(LocalEvaluatorTest, ADamagedFolderIsFatalOnlyWhereNoSlotIsLeft) {
               StartsWith("Error: Unable to open " + (folder_ / "run_Process1/parameters.txt") +
                          "\nNo such file or directory\nno process folder is left"));
   EXPECT_EQ(launcher.starts, 2);
+  LocalEvaluator& withTwo = makeEvaluator(launcher, 2, 100);
+  launcher.renewError = "no room";
+  EXPECT_THAT(
+      refusalOf([&] {
+        evaluate(withTwo, {1.0, 2.0, 3.0, 4.0});
+      }),
+      testing::EndsWith("made anew: no room\nno process folder is left: the model damages them, and the last one "
+                        "could not be made anew"));
+  EXPECT_THAT(observer_.events, testing::Contains(HasSubstr("as its process folder was damaged. Unable to open")));
+  launcher.renewError.clear();
   launcher.starts = 0;
   rarely = 2;
   EXPECT_EQ(evaluate(makeEvaluator(launcher, 1, 100), {1.0, 2.0, 3.0, 4.0, 6.0}).size(), 5U);

@@ -129,7 +129,8 @@ void RankEvaluator::giveUp(int rank, const GivenUpMessage& message) {
   ledger_.putBack(*std::exchange(worker(rank).set, std::nullopt));
   worker(rank).isGivenUp = true;
   for (const std::string& text : message.warnings) observer_.warning(text);
-  const FolderDamage damage{message.what, fmt::format("{}; reported by {}", message.why, nameOf(rank))};
+  const FolderDamage damage{message.what, fmt::format("{}; reported by {}", message.why, nameOf(rank)),
+                            message.isFinal};
   if (std::all_of(workers_.begin(), workers_.end(), [](const Worker& each) { return each.isGivenUp; })) {
     failWithoutSlots(damage);
   }

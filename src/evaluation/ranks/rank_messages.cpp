@@ -40,7 +40,9 @@ struct Layout<KeepFolderMessage> {
 };
 template <>
 struct Layout<GivenUpMessage> {
-  static void of(auto& archive, auto& message) { archive(message.what, message.why, message.warnings); }
+  static void of(auto& archive, auto& message) {
+    archive(message.what, message.why, message.warnings, message.isFinal);
+  }
 };
 template <>
 struct Layout<FailureMessage> {

@@ -63,6 +63,7 @@ struct GivenUpMessage {
   std::string what;
   std::string why;
   std::vector<std::string> warnings;
+  bool isFinal = false;
 };
 
 struct FailureMessage {

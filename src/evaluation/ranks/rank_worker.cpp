@@ -93,9 +93,9 @@ void runWorkerLoop(Job& job, ModelRunner& runner, MasterWatch& watch, std::vecto
     }
     if (message.tag != static_cast<int>(RankMessage::set)) refuse(message);
     if (auto damage = runner.renewIfDamaged(kSlot, warnings)) {
-      sendToMaster(
-          job, RankMessage::givenUp,
-          encode(GivenUpMessage{std::move(damage->what), std::move(damage->why), std::exchange(warnings, {})}));
+      sendToMaster(job, RankMessage::givenUp,
+                   encode(GivenUpMessage{std::move(damage->what), std::move(damage->why), std::exchange(warnings, {}),
+                                         damage->isFinal}));
       continue;
     }
     auto result = runModel(job, runner, decodeSet(message.content), watch);

@@ -1,5 +1,6 @@
 #include "run/results/record_file.h"
 
+#include <algorithm>
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
@@ -92,8 +93,7 @@ bool RecordFile::tryAppend(std::string_view record, std::string& reason) {
   }
   const EndingSignalsHeld held;  // so that a signal's closing line follows a whole record
   if (!putBackIfRemoved(descriptor_, path_)) {
-    reason = errno == EEXIST ? "another program has replaced it with another file. With Restart = 1 the setup goes on "
-                               "from what is in that and makes the other evaluations again"
+    reason = errno == EEXIST ? replacedText()
                              : std::string("it was removed and cannot be put back: ") + std::strerror(errno);
     failed_ = true;
     return false;
@@ -121,20 +121,39 @@ bool RecordFile::tryAppend(std::string_view record, std::string& reason) {
 bool RecordFile::takeUpSize(std::string& reason) {
   struct stat status {};
   if (::fstat(descriptor_, &status) != 0 || !S_ISREG(status.st_mode)) return true;
-  // A network file system may show an earlier size for a while, until the file is opened anew.
+  // A network file system may show an earlier size for a while, until the file is opened anew. Afterwards any size but
+  // the old one is of a program that has written the file again.
   constexpr int kMoreLooks = 10;
   constexpr timespec kPause{0, 100'000'000};
+  std::int64_t shortest = size_;
   for (int look = 0; look < kMoreLooks && status.st_size < size_; ++look) {
+    shortest = std::min<std::int64_t>(shortest, status.st_size);
     ::nanosleep(&kPause, nullptr);
     const Descriptor again(::open(path_.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
     if (::fstat(descriptor_, &status) != 0) return true;
   }
-  if (status.st_size < size_) {
-    reason = shortenedText(size_, status.st_size);
+  if (shortest < size_ && status.st_size != size_) {
+    reason = shortenedText(size_, shortest);
     return false;
   }
   size_ = status.st_size;
   return true;
+}
+
+bool RecordFile::isAtItsPath(std::string& reason) const {
+  if (failed_) {
+    reason = "it takes no more records";
+    return false;
+  }
+  struct stat open {};
+  struct stat named {};
+  if (::fstat(descriptor_, &open) != 0 || ::lstat(path_.c_str(), &named) != 0) {
+    reason = std::strerror(errno);
+    return false;
+  }
+  const bool isSame = open.st_dev == named.st_dev && open.st_ino == named.st_ino;
+  if (!isSame) reason = replacedText();
+  return isSame;
 }
 
 bool RecordFile::endsLine() const {
@@ -177,6 +196,11 @@ bool RecordFile::tryClose(std::string& reason) {
   const int error = ::close(descriptor) == 0 || errno == EINTR ? lost : errno;
   if (error != 0 && isWhole) reason = std::strerror(error);
   return error == 0 && isWhole;
+}
+
+std::string replacedText() {
+  return "another program has replaced it with another file. Move that away, unless it is a copy of this one, before "
+         "the setup is run again";
 }
 
 std::string shortenedText(std::int64_t from, std::int64_t to) {

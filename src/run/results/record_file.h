@@ -44,6 +44,10 @@ class RecordFile final {
   /// Like close(), but returns false, with the system's reason, instead of throwing.
   bool tryClose(std::string& reason);
 
+  /// Whether it has taken every record and is still what is at its path, so that it may be replaced by path. False with
+  /// the reason.
+  bool isAtItsPath(std::string& reason) const;
+
   bool isOpen() const { return descriptor_ >= 0; }
   const std::string& path() const { return path_; }
   int descriptor() const { return descriptor_; }
@@ -62,6 +66,8 @@ class RecordFile final {
   bool failed_ = false;
 };
 
+/// That another program has replaced a file, and what to do.
+std::string replacedText();
 /// That another program has shortened a file, and what to do.
 std::string shortenedText(std::int64_t from, std::int64_t to);
 

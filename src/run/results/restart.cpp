@@ -75,14 +75,25 @@ void requireSameSettings(const RestartSettings& then, const RestartSettings& now
   refuse(detail);
 }
 
-/// How many of the lines that are no rows were some, as far as can be told: of evaluations of which no row is left. The
-/// others are none of the run's.
-std::size_t countDamagedRows(const ResultTable& table, const RowChecksums& checksums, int planned) {
-  std::set<int> numbers = table.numbersOfUnusable;
-  for (const auto& [number, checksum] : checksums) numbers.insert(number);
-  for (const ResultRow& row : table.rows) numbers.erase(row.number);
-  const auto count = std::distance(numbers.lower_bound(1), numbers.upper_bound(std::max(planned, 0)));
-  return std::min(table.unusableLines, static_cast<std::size_t>(count));
+/// Evaluations of which no row is left.
+struct LostRows {
+  std::size_t damaged =
+      0;  ///< lines that were their rows, as far as can be told; the other lines are none of the run's
+  std::size_t missing = 0;  ///< without such a line, though there is a checksum
+};
+
+LostRows countLostRows(const ResultTable& table, const RowChecksums& checksums, int planned) {
+  std::set<int> whole;
+  for (const ResultRow& row : table.rows) whole.insert(row.number);
+  const auto isLost = [&](int number) { return number >= 1 && number <= planned && whole.count(number) == 0; };
+  const std::set<int>& damaged = table.numbersOfUnusable;
+  std::set<int> missing;
+  for (const auto& [number, checksum] : checksums) {
+    if (isLost(number) && damaged.count(number) == 0) missing.insert(number);
+  }
+  const std::size_t cut = table.hasCutRow ? 1 : 0;  // its number may be cut, too
+  return {static_cast<std::size_t>(std::count_if(damaged.begin(), damaged.end(), isLost)) + cut,
+          missing.size() - std::min(missing.size(), cut)};
 }
 
 /// Rows that cannot be read are made again; one that can be read and does not hold would have been believed, and only
@@ -152,17 +163,21 @@ std::optional<EarlierRun> earlierRunIn(const std::string& text, const RestartFil
 
   const RowChecksums checksums = readRowChecksums(readFileIfThere(files.checksums).value_or(""));
   const std::size_t withoutChecksum = requireRowsThatHold(table.rows, checksums, files, config);
-  const std::size_t damaged = countDamagedRows(table, checksums, config.plannedModelRuns());
+  const LostRows lost = countLostRows(table, checksums, config.plannedModelRuns());
   if (!record) record = recordOfEarlierVersion(table);
   EarlierRun run{std::move(table.rows), std::move(record->started), std::move(record->restarted), then.searches, {}};
   putInOrder(run.rows);
-  if (damaged > 0) {
+  if (lost.damaged > 0) {
     run.notes.push_back(
-        fmt::format("Rows of {} that were cut off or damaged are made again: {}", files.results, damaged));
+        fmt::format("Rows of {} that were cut off or damaged are made again: {}", files.results, lost.damaged));
   }
-  if (table.unusableLines > damaged) {
+  if (lost.missing > 0) {
+    run.notes.push_back(fmt::format("Rows of {} that are missing, though {} has their checksums, are made again: {}",
+                                    files.results, fileNameOf(files.checksums), lost.missing));
+  }
+  if (table.unusableLines > lost.damaged) {
     run.notes.push_back(fmt::format("Lines of {} that are no rows of this run are passed over: {}", files.results,
-                                    table.unusableLines - damaged));
+                                    table.unusableLines - lost.damaged));
   }
   if (withoutChecksum > 0) {
     run.notes.push_back(
@@ -240,25 +255,47 @@ void RestartSettingsFile::write(const RunConfig& config) {
   text_ = formatRestartSettings(restartSettings(config));
   nextLook_ = clock_() + kSettingsSeconds;
   std::string reason;
-  if (!replaceFile(path_, text_, reason)) fatalError("Error: Unable to write to " + path_, reason);
+  if (!writeText(reason)) fatalError("Error: Unable to write to " + path_, reason);
 }
 
 std::string RestartSettingsFile::keep() {
   std::string reason;
-  if (hasFailed_ || text_.empty() || clock_() < nextLook_) return {};
+  if (hasWarned_ || text_.empty() || clock_() < nextLook_) return {};
   nextLook_ = clock_() + kSettingsSeconds;
-  hasFailed_ = !putBack(reason);
-  return hasFailed_ ? fmt::format(
-                          "{} was removed and cannot be written again: {}. Without it the run cannot be "
-                          "continued if it is interrupted",
-                          path_, reason)
-                    : std::string();
+  const bool isThere = putBack(reason);
+  hasWarned_ = !isThere || isAnother();
+  if (!hasWarned_) return {};
+  if (!isThere) {
+    return fmt::format(
+        "{} was removed or emptied and cannot be written again: {}. Without it the run cannot be continued if it is "
+        "interrupted",
+        path_, reason);
+  }
+  return fmt::format(
+      "Another program has replaced or changed {}. If the run is interrupted, a restart takes what is in it for the "
+      "settings of the run",
+      path_);
 }
 
-bool RestartSettingsFile::putBack(std::string& reason) const {
+bool RestartSettingsFile::putBack(std::string& reason) {
   struct stat status {};
-  const bool isMissing = ::lstat(path_.c_str(), &status) != 0 && errno == ENOENT;
-  return text_.empty() || !isMissing || replaceFile(path_, text_, reason);
+  const bool isThere = ::lstat(path_.c_str(), &status) == 0;
+  const bool isLost = isThere ? S_ISREG(status.st_mode) && status.st_size == 0 : errno == ENOENT;
+  return text_.empty() || !isLost || writeText(reason);
+}
+
+bool RestartSettingsFile::writeText(std::string& reason) {
+  if (!replaceFile(path_, text_, reason)) return false;
+  struct stat status {};
+  inode_ = ::lstat(path_.c_str(), &status) == 0 ? status.st_ino : 0;
+  return true;
+}
+
+/// Whether what is at the path is certainly not what was written.
+bool RestartSettingsFile::isAnother() const {
+  struct stat status {};
+  return ::lstat(path_.c_str(), &status) == 0 &&
+         ((inode_ != 0 && status.st_ino != inode_) || status.st_size != std::ssize(text_));
 }
 
 }  // namespace mirevo

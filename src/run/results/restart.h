@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <functional>
 #include <map>
 #include <optional>
@@ -72,20 +73,24 @@ class RestartSettingsFile final {
 
   /// Throws FatalError.
   void write(const RunConfig& config);
-  /// To be called now and then: writes the file again if something has removed it, which is looked for once a second.
-  /// Returns a warning where that fails, once.
+  /// To be called now and then: writes the file again if something has removed or emptied it, which is looked for once
+  /// a second. Returns a warning, once, where that fails or another program has replaced or changed the file.
   std::string keep();
   /// The same at once, for the end of a run. False, with the system's reason, when that fails.
-  bool putBack(std::string& reason) const;
+  bool putBack(std::string& reason);
 
   const std::string& path() const { return path_; }
 
  private:
+  bool writeText(std::string& reason);
+  bool isAnother() const;
+
   std::string path_;
   Clock clock_;
   std::string text_;
   double nextLook_ = 0.0;
-  bool hasFailed_ = false;
+  std::uint64_t inode_ = 0;  ///< of the file as written; 0: not known
+  bool hasWarned_ = false;
 };
 
 }  // namespace mirevo

@@ -100,6 +100,25 @@ bool ResultFile::finish(std::span<const std::string> closingLines, std::string& 
   return isRewritten && (aggregates_.empty() || checksums_.replace(checksumsOfRows(), reason));
 }
 
+/// Whether each row is where it was written, and as it was: whatever else another program has made of the file is not
+/// to be taken apart.
+bool ResultFile::hasRowsAsWritten(std::string_view content, std::string& reason) const {
+  for (const Place& place : rows_) {
+    const std::string_view line = content.substr(std::min(content.size(), static_cast<std::size_t>(place.offset)),
+                                                 static_cast<std::size_t>(place.length));
+    if (std::ssize(line) == place.length && line.back() == '\n' &&
+        checksumOf(line.substr(0, line.size() - 1)) == place.checksum) {
+      continue;
+    }
+    reason = fmt::format(
+        "another program has changed it: the row of evaluation No. {} is not where and as it was written. The file is "
+        "left as it is, and a restart tells of rows that do not hold",
+        place.number);
+    return false;
+  }
+  return true;
+}
+
 /// Gives a row its final aggregate; returns its line without the end.
 std::string ResultFile::settleLine(std::string_view content, Place& place) const {
   const auto length = static_cast<std::size_t>(place.length) - 1;
@@ -133,12 +152,14 @@ std::string ResultFile::linesOfOthers(std::string_view content) const {
 }
 
 bool ResultFile::rewriteInOrder(std::string_view closing, std::string& reason) {
+  if (!file_.isAtItsPath(reason)) return false;
   const auto content = readTextFile(path(), reason);
   if (!content) return false;
   if (std::ssize(*content) < file_.size()) {
     reason = shortenedText(file_.size(), std::ssize(*content));
     return false;
   }
+  if (!hasRowsAsWritten(*content, reason)) return false;
   const std::string others = linesOfOthers(*content);
   std::stable_sort(rows_.begin(), rows_.end(), [](const Place& a, const Place& b) { return a.number < b.number; });
   std::vector<RowChecksum> checksums = checksumsOfRows();

@@ -53,6 +53,7 @@ class ResultFile final {
     std::uint64_t checksum;
   };
   bool isInOrder() const;
+  bool hasRowsAsWritten(std::string_view content, std::string& reason) const;
   std::string settleLine(std::string_view content, Place& place) const;
   std::vector<RowChecksum> checksumsOfRows() const;
   std::string linesOfOthers(std::string_view content) const;

@@ -38,7 +38,8 @@ ResultTable readResultTable(std::string_view text, const ResultColumns& columns)
     const std::size_t end = text.find('\n');
     const std::string_view line = trimTrailing(text.substr(0, end));
     if (end == std::string_view::npos) {
-      noteUnusable(line, table);
+      ++table.unusableLines;
+      table.hasCutRow = !line.empty() && line.front() != '#';
       return table;
     }
     text.remove_prefix(end + 1);

@@ -20,7 +20,8 @@ struct ResultTable {
   std::size_t rowsOfOtherColumns = 0;     ///< complete rows if the header row has a different number of columns
   std::vector<std::string> closingLines;  ///< `#` lines after the header row, without "# "
   std::size_t unusableLines = 0;          ///< rows that were cut off or damaged, and what else is no row
-  std::set<int> numbersOfUnusable;        ///< which evaluations those of them are that begin with a number
+  bool hasCutRow = false;                 ///< the last line has no end and is no comment; it counts as unusable
+  std::set<int> numbersOfUnusable;        ///< which evaluations the others of them are that begin with a number
 };
 
 /// Reads the text of a result file with these columns. A last line without a line end counts as cut off even if it can

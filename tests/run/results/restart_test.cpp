@@ -121,6 +121,16 @@ TEST_F(RestartSettingsTest, AFileThatIsRemovedDuringTheRunIsPutBack) {
   EXPECT_FALSE(isThereAt(0.5));
   EXPECT_TRUE(isThereAt(1.5));
   EXPECT_EQ(folder_.read("settings.dat"), written);
+
+  folder_.write("settings.dat", "");
+  now = 3.0;
+  EXPECT_EQ(file.keep(), "");
+  EXPECT_EQ(folder_.read("settings.dat"), written);
+  std::filesystem::rename(folder_.write("other", written), folder_ / "settings.dat");
+  now = 5.0;
+  EXPECT_THAT(file.keep(), HasSubstr("Another program has replaced or changed"));
+  now = 7.0;
+  EXPECT_EQ(file.keep(), "");
 }
 
 /// A run whose result file holds the rows that a test gives it.
@@ -170,6 +180,11 @@ TEST_F(EarlierRunTest, RowsThatTheRunGoesOnFrom) {
   EXPECT_EQ(taken(config, config, rows + "6\tOK\t400\t0\nof another\n5\tOK\n99\tOK\n"), "1 2 3 4 5 ");
   EXPECT_THAT(notes_, ElementsAre(HasSubstr("made again: 1"), HasSubstr("no rows of this run are passed over: 3"),
                                   HasSubstr("no checksum")));
+  folder_.write("setup_Optimisation_Checksums.dat", "Evaluation\tChecksum\n7\t00000000000000ff\n9\t00000000000000ff\n");
+  taken(config, config, rows + "6\tOK\nof another\nof another\n7\tO");
+  EXPECT_THAT(notes_,
+              ElementsAre(HasSubstr("damaged are made again: 2"), HasSubstr("has their checksums, are made again: 1"),
+                          HasSubstr("no rows of this run are passed over: 2"), HasSubstr("no checksum")));
   EXPECT_EQ(taken(config, config, rows + row(30) + row(31)), "1 2 3 4 5 30 31 ");
   config.restart = RestartMode::goOnAndRepeatFailed;
   EXPECT_EQ(taken(config, config, rows), "1 2 ");

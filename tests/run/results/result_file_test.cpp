@@ -1,6 +1,7 @@
 #include "run/results/result_file.h"
 
 #include <algorithm>
+#include <chrono>
 #include <cmath>
 #include <csignal>
 #include <sys/resource.h>
@@ -135,11 +136,15 @@ TEST_F(ResultFileTest, OneThatAnotherProgramHasShortenedTakesNoMoreRows) {
   for (const bool isAtEnd : {false, true}) {
     open();
     for (const int number : {2, 1}) add(success(number, 1, 1), 1);
-    folder_.write("r.dat", folder_.read("r.dat").substr(0, 60));
+    const std::string text = folder_.read("r.dat");
+    folder_.write("r.dat", text.substr(0, 60));
     if (!isAtEnd) reason_ = refusalOf([this] { add(success(3, 1, 1), 1); });
     EXPECT_FALSE(isAtEnd && results_.finish({}, reason_));
     EXPECT_THAT(reason_, testing::HasSubstr("another program has shortened it, from "));
     EXPECT_EQ(folder_.read("r.dat").size(), 60U);
+    folder_.write("r.dat", text);
+    EXPECT_EQ(results_.finish({}, reason_), isAtEnd) << "it is closed after the first, and failed before the other";
+    EXPECT_EQ(folder_.read("r.dat"), text);
   }
 }
 
@@ -152,12 +157,34 @@ TEST_F(ResultFileTest, OneThatSeemsShorterForAMomentIsNot) {
   add(success(2, 1, 1), 1);
   mend.join();
   EXPECT_EQ(folder_.read("r.dat"), text + "2\tOK\t1\t1\t1\t1\n");
+
+  std::filesystem::resize_file(path_, 60);
+  std::thread edit([&] {
+    std::this_thread::sleep_for(std::chrono::milliseconds(300));
+    std::filesystem::resize_file(path_, 1000);
+  });
+  EXPECT_THAT(refusalOf([this] { add(success(3, 1, 1), 1); }), testing::HasSubstr("another program has shortened it"));
+  edit.join();
 }
 
 TEST_F(ResultFileTest, OneThatAnotherFileReplacesIsNotCalledRemoved) {
   open();
   std::filesystem::rename(folder_.write("other", ""), path_);
   EXPECT_THAT(refusalOf([this] { add(success(1, 1, 1), 1); }), testing::HasSubstr("another program has replaced it"));
+}
+
+TEST_F(ResultFileTest, OneThatAnotherProgramHasWrittenAgainIsLeftAsItIs) {
+  for (const bool isReplaced : {true, false}) {
+    open();
+    for (const int number : {2, 1}) add(success(number, 1, 1), 1);
+    std::string text = folder_.read("r.dat");
+    text.insert(text.find("2\tOK"), "3\tOK\t1\t1\t1\t1\n");
+    const std::string written = folder_.write(isReplaced ? "other" : "r.dat", text);
+    if (isReplaced) std::filesystem::rename(written, path_);
+    EXPECT_FALSE(results_.finish({}, reason_));
+    EXPECT_THAT(reason_, testing::HasSubstr(isReplaced ? "has replaced it" : "has changed it: the row of evaluation"));
+    EXPECT_EQ(folder_.read("r.dat"), text);
+  }
 }
 
 TEST_F(ResultFileTest, WhatAnotherProgramAppendsStays) {
