@@ -145,7 +145,7 @@ TEST(CommandLine, AJobWithoutThePartForMpiIsRefusedWithWhatIsMissing) {
       const ProgramResult result = start(job);
       EXPECT_EQ(result.exitCode, 1);
       EXPECT_THAT(result.error, AllOf(HasSubstr("cannot take part in this MPI job"), HasSubstr(fault),
-                                      HasSubstr("Install the package mirevo-mpi")));
+                                      HasSubstr("packages mirevo and mirevo-mpi")));
       EXPECT_FALSE(folder.exists("basin.log"));
     }
     folder.write("bin/lib/mirevo/mirevo-mpi.so", "no module");
