@@ -15,13 +15,19 @@ _mirevo() {
       *--keyword*) ;;
       *) return ;;
     esac
-    local name keyword
+    local name names begin=${current,,}
     while IFS= read -r name; do
-      keyword=${name##*/}
-      case "${keyword,,}" in "${current,,}"*) COMPREPLY+=("$keyword") ;; esac
-      case "${name,,}" in "${current,,}"*) [[ $current == */* ]] && COMPREPLY+=("$name") ;; esac
+      while :; do # the keyword, then the sections that it is in
+        names+=$name$'\n'
+        [[ $current == */* ]] || names+=${name##*/}$'\n'
+        [[ $name == */* ]] || break
+        name=${name%/*}
+      done
     done < <(_mirevo_answer "$program" --keyword)
-    mapfile -t COMPREPLY < <(printf '%s\n' "${COMPREPLY[@]}" | sort -u)
+    [[ $current == */* ]] || names=$(grep -v / <<<"$names")
+    while IFS= read -r name; do
+      case "${name,,}" in "$begin"*) [ -z "$name" ] || COMPREPLY+=("$name") ;; esac
+    done < <(sort -u <<<"$names")
     return
   fi
   case "$current" in

@@ -6,7 +6,7 @@
 
 namespace mirevo {
 
-/// The program's version, "0.1.0".
+/// The program's version, "0.2.0".
 std::string_view programVersion();
 
 /// What a program answers to --version: in the first line its name and version, then a line each about the compiler,

@@ -29,7 +29,7 @@ setup has written so far. The run may go on meanwhile, may have ended in any way
 or have been cut off; its files are only read.
 
   --version   prints the version, and what the program was built with
-  --help      prints this text
+  --help, -h  prints how it is called, and what its exit codes mean
 
 Exit codes: 0 after a report or an answer; 1 if there is none: the setup is
 refused, no run of it has written anything, the file cannot be written, or the
@@ -55,7 +55,7 @@ int makeReport(const std::string& setupFileName) {
 
 int reportProgram(std::span<const std::string> arguments) {
   const std::string_view argument = arguments.size() == 1 ? std::string_view(arguments.front()) : std::string_view();
-  if (argument == "--help") return writeToOutput(fmt::format("{}\n{}", kUsage, kHelp)) ? 0 : 1;
+  if (argument == "--help" || argument == "-h") return writeToOutput(fmt::format("{}\n{}", kUsage, kHelp)) ? 0 : 1;
   if (argument == "--version") return writeToOutput(versionText("mirevo-report", libraryVersions())) ? 0 : 1;
   if (argument.empty() || argument.starts_with("--")) {
     if (arguments.size() > 1) showMessage("One setup file at a time, and nothing beside a question");

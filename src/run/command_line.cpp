@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <array>
 #include <cstddef>
+#include <iterator>
 #include <span>
 
 #include <fmt/core.h>
@@ -23,7 +24,10 @@ bool asksForViewer(std::string_view argument) {
 }
 
 constexpr std::string_view kKeywordQuestion = "--keyword";
-constexpr std::array<std::string_view, 3> kQuestions = {"--help", "--version", kKeywordQuestion};
+constexpr std::string_view kHelpQuestion = "--help";
+constexpr std::string_view kShortHelpQuestion = "-h";
+constexpr std::array<std::string_view, 4> kQuestions = {kHelpQuestion, kShortHelpQuestion, "--version",
+                                                        kKeywordQuestion};
 
 std::string listOf(std::span<const std::string> arguments) {
   std::string list;
@@ -72,12 +76,13 @@ std::optional<ProgramQuestion> CommandLine::question(const std::function<bool(co
     return std::find(kQuestions.begin(), kQuestions.end(), argument) != kQuestions.end();
   });
   if (asked == others.rend()) return std::nullopt;
-  ProgramQuestion question{*asked, {}, {}};
+  ProgramQuestion question{*asked == kShortHelpQuestion ? std::string(kHelpQuestion) : *asked, {}, {}};
   auto after = others.erase(asked.base() - 1);
   if (question.name == kKeywordQuestion && after != others.end()) {
     question.keyword = *after;
     others.erase(after);
   }
+  std::copy_if(arguments_.begin(), arguments_.end(), std::back_inserter(others), isSwitch);
   if (!others.empty()) {
     question.ignored.push_back(
         fmt::format("Ignored: {}; {} is answered, and nothing is run", listOf(others), question.name));

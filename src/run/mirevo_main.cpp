@@ -36,7 +36,7 @@ Calibrates and analyses a simulation model as the setup file (KDX format) says.
   --keyword        names every keyword of a setup, as SECTION/Keyword
   --keyword NAME   explains a keyword or a section
   --version        prints the version, and what the program was built with
-  --help           prints this text
+  --help, -h       prints how it is called, and what its exit codes mean
 
 Of several setup files the last one counts. Written beside it: <setup>.log and
 the results of every evaluation. VOLK_PROGRESS=STDOUT prints the run's messages
@@ -87,11 +87,11 @@ void showIgnored(const std::vector<std::string>& sentences) {
 }
 
 /// If the caller has closed standard input, output or error, opens them: otherwise the run's files would get these
-/// descriptors, and messages would end up in the results.
-void occupyStandardDescriptors() {
+/// descriptors, and messages would end up in the results. `access` is how: an answer must not seem to be written.
+void occupyStandardDescriptors(int access) {
   int descriptor = 0;
   do {
-    descriptor = ::open("/dev/null", O_RDWR | O_CLOEXEC);
+    descriptor = ::open("/dev/null", access | O_CLOEXEC);
   } while (descriptor >= 0 && descriptor <= STDERR_FILENO);
   if (descriptor > STDERR_FILENO) ::close(descriptor);
 }
@@ -99,8 +99,8 @@ void occupyStandardDescriptors() {
 }  // namespace
 
 void processStart(int argc, char** argv) {
-  occupyStandardDescriptors();
   const CommandLine commandLine(argc, argv);
+  occupyStandardDescriptors(commandLine.question(isSetup) ? O_RDONLY : O_RDWR);
   if (!commandLine.wantsProgressViewer()) runWithFrontEnd("G48=WIN", commandLine);
   const auto run = [&commandLine] { runWithFrontEnd("G48=QMON", commandLine); };
   const std::string setupFileName(commandLine.setupFileName());

@@ -21,7 +21,7 @@ the run and in another terminal.
   d   leaves, as does Ctrl-C; the run goes on
 
   --version   prints the version, and what the program was built with
-  --help      prints this text
+  --help, -h  prints how it is called, and what its exit codes mean
 
 Exit codes: 0, however the run goes or has ended, and after an answer; 1 if
 there is no such setup and no run of it, or the command line is refused.
@@ -41,7 +41,7 @@ bool isKnown(const std::string& argument) {
 
 int main(int argc, char** argv) {
   const std::string argument = argc == 2 ? argv[1] : "";
-  if (argument == "--help") return mirevo::writeToOutput(std::string(kUsage).append(kHelp)) ? 0 : 1;
+  if (argument == "--help" || argument == "-h") return mirevo::writeToOutput(std::string(kUsage).append(kHelp)) ? 0 : 1;
   if (argument == "--version") return mirevo::writeToOutput(mirevo::versionText("mirevo-viewer")) ? 0 : 1;
   if (argument.empty() || (argument.starts_with("--") && !isKnown(argument))) {
     if (argc > 2) fmt::print(stderr, "mirevo-viewer: One setup file at a time, and nothing beside a question\n");

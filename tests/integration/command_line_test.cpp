@@ -19,7 +19,8 @@ TEST(CommandLine, WithoutASetupFileTheUsageIsShown) {
 TEST(CommandLine, QuestionsAboutAProgramAreAnsweredAndLeaveNoFile) {
   for (const char* program : {MIREVO_PROGRAM, MIREVO_VIEWER, MIREVO_REPORT}) {
     const std::string name = std::filesystem::path(program).filename();
-    for (const auto& [question, answer] : {std::pair{"--version", name + " "}, {"--help", "Usage: " + name}}) {
+    for (const auto& [question, answer] :
+         {std::pair{"--version", name + " "}, {"--help", "Usage: " + name}, {"-h", "Usage: " + name}}) {
       const TemporaryFolder folder;
       const std::string command = "cd '" + folder.path() + "' && exec '" + program + "' " + question;
       const ProgramResult result = RunningProgram({"-c", command}, {}, "sh").wait();
@@ -45,9 +46,11 @@ TEST(CommandLine, QuestionsAreAnsweredUnlessTheLastArgumentIsAFile) {
       {"--version --help", 0, "Usage: ", "Mirevo: Ignored: \"--version\"; --help is answered"},
       {"--help none.kdx", 0, "Usage: ", "Mirevo: Ignored: \"none.kdx\"; --help is answered"},
       {"--keyword", 0, "MIREVO_SIMULATION_OPTION/Option\n", ""},
-      {"--keyword title //x", 0, "MIREVO_SIMULATION_OPTION/Title\n  Meaning: ", ""},
+      {"--keyword title //x", 0,
+       "MIREVO_SIMULATION_OPTION/Title\n  Meaning: ", "Mirevo: Ignored: \"//x\"; --keyword is answered"},
       {"--keyword Title", 0, "MIREVO_SIMULATION_OPTION/Title\n  Meaning: ", ""},
       {"--keyword maxno", 1, "", "did you mean OPTIMISATION_ALGORITHM/STOPPING_CRITERIA/Max_No_Evaluations"},
+      {"--help >&-", 1, "", ""},
       {"--keywrd", 1, "", "Mirevo: Unknown option \"--keywrd\"\nMirevo: Usage: "},
   };
   for (const Case& each : cases) {
@@ -56,6 +59,8 @@ TEST(CommandLine, QuestionsAreAnsweredUnlessTheLastArgumentIsAFile) {
     EXPECT_EQ(result.exitCode, each.exitCode) << each.arguments;
     EXPECT_THAT(result.output, StartsWith(each.output));
     EXPECT_THAT(result.error, HasSubstr(each.error));
+    EXPECT_EQ(result.output.empty(), each.output[0] == '\0') << each.arguments;
+    EXPECT_EQ(result.error.empty(), each.error[0] == '\0') << each.arguments;
     for (const char* left : {"--version.log", "--version._spi_", "--version_Termination.log"}) {
       std::filesystem::remove(folder / left);  // of the run that is refused
     }
@@ -145,7 +150,7 @@ TEST(CommandLine, AJobWithoutThePartForMpiIsRefusedWithWhatIsMissing) {
       const ProgramResult result = start(job);
       EXPECT_EQ(result.exitCode, 1);
       EXPECT_THAT(result.error, AllOf(HasSubstr("cannot take part in this MPI job"), HasSubstr(fault),
-                                      HasSubstr("Install the package mirevo-mpi")));
+                                      HasSubstr("packages mirevo and mirevo-mpi")));
       EXPECT_FALSE(folder.exists("basin.log"));
     }
     folder.write("bin/lib/mirevo/mirevo-mpi.so", "no module");

@@ -10,7 +10,6 @@
 #include <fmt/core.h>
 
 #include "common/fatal_error.h"
-#include "common/version.h"
 
 namespace mirevo {
 namespace {
@@ -18,7 +17,8 @@ namespace {
 constexpr const char* kCannotJoin = "Error: Mirevo cannot take part in this MPI job";
 constexpr std::string_view kRemedy =
     "A job launcher (mpirun, srun) has started this process as one of several, which would all do the same run. "
-    "Install the package mirevo-mpi, or Mirevo from a build with MIREVO_MPI=ON; or start it without the launcher.";
+    "Use the Debian packages mirevo and mirevo-mpi, both, or build Mirevo where the MPI is, with MIREVO_MPI=ON; or "
+    "start it without the launcher.";
 
 /// Where the module may be, relative to the folder of the program: installed, and in the build tree.
 constexpr std::array<const char*, 2> kModules = {MIREVO_MODULE_FOLDER "/mirevo-mpi.so", "lib/mirevo/mirevo-mpi.so"};
@@ -64,9 +64,9 @@ std::unique_ptr<Job> joinMpiJob() {
     fatalError(kCannotJoin, fmt::format("Its part for MPI cannot be loaded: {}. {}", ::dlerror(), kRemedy));
   }
   const std::string_view version = static_cast<const char*>(symbolOf(module, kModuleVersionName, path));
-  if (version != programVersion()) {
+  if (version != MIREVO_MODULE_VERSION) {
     fatalError(kCannotJoin, fmt::format("{} is of Mirevo {}, and this is {}. {}", path.string(), version,
-                                        programVersion(), kRemedy));
+                                        MIREVO_MODULE_VERSION, kRemedy));
   }
   return std::unique_ptr<Job>(reinterpret_cast<JoinMpiJob*>(symbolOf(module, kJoinMpiJobName, path))());
 }

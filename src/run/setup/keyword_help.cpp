@@ -1,6 +1,7 @@
 #include "run/setup/keyword_help.h"
 
 #include <algorithm>
+#include <map>
 
 #include <fmt/core.h>
 
@@ -12,7 +13,7 @@ namespace mirevo {
 namespace {
 
 constexpr std::size_t kTextColumns = 78;
-constexpr std::size_t kMostNames = 12;
+constexpr std::size_t kMostNames = 4;
 
 /// Lower case, with `n` for the numbers of items.
 std::string comparable(std::string_view name) {
@@ -127,15 +128,20 @@ std::vector<std::string> namesLike(std::string_view name) {
   const std::string_view last = name.substr(name.rfind('/') + 1);  // its section may be the wrong one
   const std::string wanted = withoutUnderscores(last);
   std::vector<std::string> known;
-  std::vector<std::string> like;
+  std::multimap<std::size_t, std::string> found;  // by how much else they contain, more where it comes before
   const auto consider = [&](std::string_view candidate, const std::string& path) {
     known.emplace_back(candidate);
-    const bool isLike = !wanted.empty() && withoutUnderscores(candidate).find(wanted) != std::string::npos;
-    if (isLike && like.size() < kMostNames) like.push_back(path);
+    const std::string compared = withoutUnderscores(candidate);
+    const std::size_t at = wanted.empty() ? std::string::npos : compared.find(wanted);
+    if (at != std::string::npos) found.emplace(compared.size() - wanted.size() + at, path);
   };
   for (const SectionRow* section : setupSchema().sections()) {
     consider(section->path.substr(section->path.rfind('/') + 1), std::string(section->path));
     for (const KeywordRow& row : section->keywords) consider(row.name(), pathOf(*section, row));
+  }
+  std::vector<std::string> like;
+  for (const auto& [rest, path] : found) {
+    if (like.size() < kMostNames) like.push_back(path);
   }
   if (like.empty()) {
     if (const auto nearest = nearestName(last, known)) like.push_back(*nearest);

@@ -72,6 +72,8 @@ TEST(KeywordHelp, EveryKeywordIsFoundByItsNameWithMoreOrLessOfItsSection) {
   EXPECT_TRUE(keywordHelp("STOPPING_CRITERIA").find("STOPPING_CRITERIA/Max_No_Evaluations\n") != std::string::npos);
   for (const char* unknown : {"", "/", "Value", "SIMPARAM/Title"}) EXPECT_EQ(keywordHelp(unknown), "") << unknown;
   EXPECT_EQ(namesLike("SIMPARAM/Titel"), std::vector<std::string>{"Title"});
+  EXPECT_EQ(namesLike("e").size(), 4U);
+  EXPECT_EQ(namesLike("max_no_evaluation").front(), "OPTIMISATION_ALGORITHM/STOPPING_CRITERIA/Max_No_Evaluations");
 }
 
 }  // namespace

@@ -216,7 +216,7 @@ extern "C" {
 
 /// The program refuses a module of another version.
 extern const char mirevoModuleVersion[];
-const char mirevoModuleVersion[] = MIREVO_VERSION;
+const char mirevoModuleVersion[] = MIREVO_MODULE_VERSION;
 
 Job* mirevoJoinMpiJob() {
   // MPI_Finalize spins; several processes may share a core.
@@ -235,7 +235,7 @@ Job* mirevoJoinMpiJob() {
   if (!launched) return nullptr;
   fatalError("Error: The processes of the job cannot reach each other by MPI",
              fmt::format("A job launcher started {} processes, of which each finds itself alone{}. Start them with the "
-                         "mpirun of the MPI that Mirevo is linked with, or with srun --mpi=pmix.",
+                         "mpirun of the MPI that its part for MPI is linked with, or with srun --mpi=pmix.",
                          *launched, code == MPI_SUCCESS ? "" : ": " + errorText(code)));
 }
 
