@@ -10,6 +10,7 @@ from docutils import nodes
 from pygments.lexer import RegexLexer, bygroups
 from pygments import token
 from sphinx import addnodes
+from sphinx.domains import Domain, ObjType
 
 project = "Mirevo"
 html_title = "Mirevo"
@@ -29,6 +30,7 @@ html_show_sphinx = False
 html_copy_source = False
 html_show_search_summary = False  # it would load pages by a script, which a browser refuses from disk
 html_show_sourcelink = False
+html_search_scorer = str(pathlib.Path(__file__).with_name("scorer.js"))
 html_static_path = ["static"]
 html_css_files = ["mirevo.css"]
 html_theme_options = {"navigation_with_keys": False}
@@ -118,6 +120,24 @@ class Reference:
     @staticmethod
     def anchor(path, name=None):
         return "keyword-" + "-".join(path.split("/") + ([name] if name else []))
+
+
+class SetupDomain(Domain):
+    """Sections and keywords as objects of the search, which leads to their anchors."""
+
+    name = "setup"
+
+    def get_objects(self):
+        reference = self.env.app.mirevo_reference
+        found = [(name, "section", anchor) for name, anchors in reference.sections.items() for anchor in anchors]
+        for name, choices in reference.keywords.items():
+            found += [(name, "keyword of " + path, anchor) for path, anchor in choices]
+        for name, kind, anchor in found:
+            self.object_types.setdefault(kind, ObjType(kind))
+            yield name, name, kind, REFERENCE, anchor, 1
+
+    def resolve_any_xref(self, *_):
+        return []  # links come from link_keywords()
 
 
 def contents_of(manual):
@@ -292,6 +312,7 @@ def start(app, env, names):
 
 def setup(app):
     app.add_lexer("kdx", SetupLexer)
+    app.add_domain(SetupDomain)
     app.connect("source-read", read_source)
     app.connect("env-before-read-docs", start)
     app.connect("doctree-read", link_keywords)

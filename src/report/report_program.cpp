@@ -13,7 +13,6 @@
 #include "common/text.h"
 #include "common/version.h"
 #include "platform/terminal/front_end.h"
-#include "platform/terminal/terminal.h"
 #include "report/library_versions.h"
 #include "report/run_report.h"
 #include "run/setup/setup_reader.h"
@@ -55,8 +54,8 @@ int makeReport(const std::string& setupFileName) {
 
 int reportProgram(std::span<const std::string> arguments) {
   const std::string_view argument = arguments.size() == 1 ? std::string_view(arguments.front()) : std::string_view();
-  if (argument == "--help" || argument == "-h") return writeToOutput(fmt::format("{}\n{}", kUsage, kHelp)) ? 0 : 1;
-  if (argument == "--version") return writeToOutput(versionText("mirevo-report", libraryVersions())) ? 0 : 1;
+  if (argument == "--help" || argument == "-h") return writeAnswer(fmt::format("{}\n{}", kUsage, kHelp));
+  if (argument == "--version") return writeAnswer(versionText("mirevo-report", libraryVersions()));
   if (argument.empty() || argument.starts_with("--")) {
     if (arguments.size() > 1) showMessage("One setup file at a time, and nothing beside a question");
     if (!argument.empty()) showMessage("Unknown option " + quotedForMessage(argument));

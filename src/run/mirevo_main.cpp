@@ -16,7 +16,6 @@
 #include "platform/jobs/job_launcher.h"
 #include "platform/jobs/mpi_module.h"
 #include "platform/terminal/front_end.h"
-#include "platform/terminal/terminal.h"
 #include "report/library_versions.h"
 #include "run/run_driver.h"
 #include "run/setup/keyword_help.h"
@@ -56,8 +55,8 @@ bool isSetup(const std::string& argument) {
 
 /// Returns the exit code.
 int answerKeyword(const std::string& name) {
-  if (name.empty()) return writeToOutput(fmt::format("{}\n", fmt::join(keywordNames(), "\n"))) ? 0 : 1;
-  if (const std::string help = keywordHelp(name); !help.empty()) return writeToOutput(help) ? 0 : 1;
+  if (name.empty()) return writeAnswer(fmt::format("{}\n", fmt::join(keywordNames(), "\n")));
+  if (const std::string help = keywordHelp(name); !help.empty()) return writeAnswer(help);
   const std::vector<std::string> like = namesLike(name);
   showMessage(fmt::format(
       "No section has the keyword {}{}", quotedForMessage(name),
@@ -72,7 +71,7 @@ int answer(const ProgramQuestion& question) {
   if (question.name == "--version") {
     text = fmt::format("{}MPI: {}\n", versionText("Mirevo", libraryVersions()), mpiSupport());
   }
-  return writeToOutput(text) ? 0 : 1;
+  return writeAnswer(text);
 }
 
 /// Whether it can only be meant as an option, which would otherwise be taken for the name of a setup.

@@ -88,7 +88,8 @@ class LineDisplay final : public Display {
     wasAwaited_ = isAwaited;
     for (const std::string& message : newMessages) text.append(printable(message, characters_)).append("\n");
     const bool isDue = situation.now - progressShownAt_ >= kProgressLineSeconds && state.done != evaluationsShown_;
-    if (!state.countLabel.empty() && isDue) {
+    // That of a run that has ended comes at the close.
+    if (!state.countLabel.empty() && isDue && state.ending.empty()) {
       text.append("-- ").append(progressLine(state, situation)).append("\n");
       progressShownAt_ = situation.now;
       evaluationsShown_ = state.done;
@@ -106,7 +107,8 @@ class LineDisplay final : public Display {
 
   void close(const ProgressState& state, const ViewerSituation& situation) override {
     std::string text;
-    if (!state.countLabel.empty()) text.append("-- ").append(progressLine(state, situation)).append("\n");
+    const bool isNew = progressShownAt_ == 0.0 || state.done != evaluationsShown_;
+    if (!state.countLabel.empty() && isNew) text.append("-- ").append(progressLine(state, situation)).append("\n");
     const std::string outcome = outcomeText(state, situation);
     if (!outcome.empty()) text.append("-- ").append(printable(outcome, characters_)).append("\n");
     writeToOutput(text);

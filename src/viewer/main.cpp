@@ -6,7 +6,7 @@
 
 #include "common/run_files.h"
 #include "common/version.h"
-#include "platform/terminal/terminal.h"
+#include "platform/terminal/front_end.h"
 #include "viewer/viewer.h"
 
 namespace {
@@ -41,8 +41,8 @@ bool isKnown(const std::string& argument) {
 
 int main(int argc, char** argv) {
   const std::string argument = argc == 2 ? argv[1] : "";
-  if (argument == "--help" || argument == "-h") return mirevo::writeToOutput(std::string(kUsage).append(kHelp)) ? 0 : 1;
-  if (argument == "--version") return mirevo::writeToOutput(mirevo::versionText("mirevo-viewer")) ? 0 : 1;
+  if (argument == "--help" || argument == "-h") return mirevo::writeAnswer(std::string(kUsage).append(kHelp));
+  if (argument == "--version") return mirevo::writeAnswer(mirevo::versionText("mirevo-viewer"));
   if (argument.empty() || (argument.starts_with("--") && !isKnown(argument))) {
     if (argc > 2) fmt::print(stderr, "mirevo-viewer: One setup file at a time, and nothing beside a question\n");
     if (!argument.empty()) fmt::print(stderr, "mirevo-viewer: Unknown option {}\n", argument);

@@ -270,14 +270,18 @@ std::string progressLine(const ProgressState& state, const ViewerSituation& situ
 
 std::string liveLine(const ProgressState& state, const ViewerSituation& situation, int width, CharacterSet characters) {
   const std::string elapsed = state.origin.startedAt ? runningForText(state, situation) + ": " : std::string();
-  if (state.countLabel.empty()) return fitted(elapsed + printable(state.task, characters), width, characters);
+  const std::string task = printable(state.task, characters);
+  if (state.countLabel.empty()) return fitted(firstThatFits({elapsed + task, task}, width), width, characters);
   const std::string runs = doneText(state, "run");
   const std::string withFailed = evaluationsText(state, "run");
   const std::string best = state.best ? ", best " + shortNumber(state.best->aggregate) : std::string();
   const bool isTimeKnown = situation.presence == RunPresence::running && state.secondsLeft;
   const std::string left = isTimeKnown ? ", " + timeLeftText(state, situation) + " left" : std::string();
   const std::string core = withFailed + best;
-  return fitted(firstThatFits({elapsed + core + left, core + left, core, withFailed, runs}, width), width, characters);
+  const std::string count = std::to_string(state.done);
+  // A number that is cut would be another one.
+  return firstThatFits({elapsed + core + left, core + left, core, withFailed, runs, doneText(state, ""), count, ""},
+                       width);
 }
 
 }  // namespace mirevo

@@ -21,6 +21,9 @@ test('a keyword is found from disk, and leads to its row of the reference', asyn
   await page.press('.sidebar-search', 'Enter');
   await page.waitForSelector('text=Search finished');
   const hits = await page.$$eval('#search-results li a', (links) => links.map((link) => link.textContent));
+  assert.equal(hits[0], 'Max_No_Evaluations');
+  assert.match(await page.getAttribute('#search-results li a', 'href'), /setup-reference\.html#keyword-.*-Max_No_Evaluations$/);
+  assert.equal(hits.at(-1), 'Changelog');
   assert.ok(hits.includes('Setup reference') && hits.includes('When a search stops'), hits.join());
 
   await page.click('#search-results li a >> text=When a search stops');

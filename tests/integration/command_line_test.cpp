@@ -26,6 +26,9 @@ TEST(CommandLine, QuestionsAboutAProgramAreAnsweredAndLeaveNoFile) {
       const ProgramResult result = RunningProgram({"-c", command}, {}, "sh").wait();
       EXPECT_EQ(result.exitCode, 0);
       EXPECT_THAT(result.output, StartsWith(answer));
+      const ProgramResult lost = RunningProgram({"-c", command + " >/dev/full"}, {}, "sh").wait();
+      EXPECT_EQ(lost.exitCode, 1);
+      EXPECT_EQ(lost.error, name + ": Unable to write the answer: No space left on device\n");
       EXPECT_TRUE(std::filesystem::is_empty(folder.path()));
     }
   }

@@ -153,7 +153,8 @@ TEST(ScreenLayout, TheLastLineAsksTellsAndOffersKeys) {
                                     {40, "4 of 40 runs, 1 failed, best 2"},
                                     {25, "4 of 40 runs, 1 failed"},
                                     {12, "4 of 40 runs"},
-                                    {10, "4 of 40..."}}) {
+                                    {10, "4 of 40"},
+                                    {6, "4"}}) {
     EXPECT_EQ(liveLine(stateOf(), situationOf(), width, CharacterSet::ascii), line);
   }
   EXPECT_EQ(progressLine(stateOf(), situationOf()),

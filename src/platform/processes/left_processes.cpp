@@ -105,6 +105,7 @@ void LeftProcesses::begin(int slot) {
   slotAt(slot).isRunning = true;
   slotAt(slot).hasEnded = false;
   slotAt(slot).endingSince.reset();
+  slotAt(slot).endedGroup = 0;
   slotAt(slot).left.clear();
 }
 
@@ -164,7 +165,7 @@ bool LeftProcesses::lookOnce() {
 std::optional<LeftProcesses::Adopted> LeftProcesses::describe(pid_t id) const {
   const auto found = findProcess(id);
   if (!found) return std::nullopt;
-  Adopted process{.name = found->name, .slot = mark_.slotOf(id), .candidates = {}};
+  Adopted process{.name = found->name, .slot = mark_.slotOf(id), .candidates = {}, .group = found->group};
   if (process.slot > 0) return process;
   for (std::size_t i = 0; i < slots_.size() && process.slot == 0; ++i) {
     if (pointsInto(id, slots_[i].folder)) process.slot = static_cast<int>(i + 1);
@@ -187,21 +188,33 @@ bool LeftProcesses::mayBelongToRunning(const Adopted& process) const {
          });
 }
 
-void LeftProcesses::giveUp(pid_t id, Adopted& process, Slot& slot, std::string problem) {
-  process.isGivenUp = true;
-  const auto named = std::find_if(slot.left.begin(), slot.left.end(), [id](const auto& left) { return left.id == id; });
-  if (named != slot.left.end()) named->problem = std::move(problem);
+/// Whether the program itself had ended it with its batch.
+bool LeftProcesses::wasEnded(pid_t group) const {
+  return std::any_of(slots_.begin(), slots_.end(),
+                     [group](const Slot& slot) { return slot.endedGroup > 0 && slot.endedGroup == group; });
 }
 
-void LeftProcesses::addKilled(int number, const std::string& batchFile, std::vector<FoundProcess> processes) {
+void LeftProcesses::giveUp(pid_t id, Adopted& process, Slot& slot, const std::string& batchFile, std::string problem) {
+  process.isGivenUp = true;
+  const auto named = std::find_if(slot.left.begin(), slot.left.end(), [id](const auto& left) { return left.id == id; });
+  if (named != slot.left.end()) {
+    named->problem = std::move(problem);
+  } else {
+    slot.left.push_back({id, process.name, batchFile, std::move(problem)});
+  }
+}
+
+void LeftProcesses::addKilled(int number, const std::string& batchFile, const std::vector<FoundProcess>& processes) {
   Slot& slot = slotAt(number);
-  for (FoundProcess& found : processes) {
+  for (const FoundProcess& found : processes) {
     Adopted& process =
-        adopted_.insert_or_assign(found.id, Adopted{.name = found.name, .slot = number, .candidates = {}})
+        adopted_
+            .insert_or_assign(found.id,
+                              Adopted{.name = found.name, .slot = number, .candidates = {}, .group = found.group})
             .first->second;
     process.isKilled = true;
-    slot.left.push_back({.id = found.id, .name = std::move(found.name), .batchFile = batchFile, .problem = {}});
-    if (::kill(found.id, 0) != 0 && errno == EPERM) giveUp(found.id, process, slot, std::strerror(EPERM));
+    if (!wasEnded(found.group)) slot.left.push_back({found.id, found.name, batchFile, {}});
+    if (::kill(found.id, 0) != 0 && errno == EPERM) giveUp(found.id, process, slot, batchFile, std::strerror(EPERM));
   }
 }
 
@@ -219,17 +232,18 @@ bool LeftProcesses::areGone(int number, const std::string& batchFile, double now
     }
     if (!slot.endingSince || !process.isKilled) slot.endingSince = now;
     const auto isIt = [id = id](const LeftProcess& left) { return left.id == id; };
-    if (std::none_of(slot.left.begin(), slot.left.end(), isIt)) {
+    if (!wasEnded(process.group) && std::none_of(slot.left.begin(), slot.left.end(), isIt)) {
       const auto found = findProcess(id);  // it may have become another program
       const bool isOfOther = process.slot == 0 && process.candidates.size() > 1;
       slot.left.push_back({id, found ? found->name : process.name, batchFile, {}, isOfOther});
     }
     // Not reaped yet, so the number is still its own.
     if (!std::exchange(process.isKilled, true) && ::kill(id, SIGKILL) != 0) {
-      giveUp(id, process, slot, std::strerror(errno));
+      giveUp(id, process, slot, batchFile, std::strerror(errno));
     } else if (now - *slot.endingSince > kKilledSeconds) {
       const auto found = findProcess(id);
-      giveUp(id, process, slot, found && found->state == 'D' ? "it is in an uninterruptible wait" : "it does not end");
+      giveUp(id, process, slot, batchFile,
+             found && found->state == 'D' ? "it is in an uninterruptible wait" : "it does not end");
     } else {
       areGone = false;
     }

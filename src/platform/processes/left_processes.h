@@ -47,7 +47,9 @@ class LeftProcesses final {
   /// To be called now and then: takes note of new children and reaps those that have ended.
   void look();
   /// Notes processes that an item of the slot's batch has left in its group and that were sent SIGKILL.
-  void addKilled(int slot, const std::string& batchFile, std::vector<FoundProcess> processes);
+  void addKilled(int slot, const std::string& batchFile, const std::vector<FoundProcess>& processes);
+  /// The program itself has ended this group of the slot's batch: what is only still dying of it was not left.
+  void addEndedGroup(int slot, pid_t group) { slotAt(slot).endedGroup = group; }
   /// To be called when the slot's batch is over, until it returns true: ends (SIGKILL) what the batch has left. True
   /// when nothing is left, or nothing but what cannot be ended. `batchFile`: the last item.
   bool areGone(int slot, const std::string& batchFile, double now);
@@ -62,6 +64,7 @@ class LeftProcesses final {
     std::string name;
     int slot = 0;              ///< 0: not known
     std::set<int> candidates;  ///< slots one of which it belongs to, if that is not known
+    pid_t group = 0;
     bool isKilled = false;
     bool isGivenUp = false;  ///< cannot be ended, and was named
   };
@@ -70,6 +73,7 @@ class LeftProcesses final {
     bool isRunning = false;  ///< from the batch's begin until nothing of it is left
     bool hasEnded = false;   ///< its items have
     std::optional<double> endingSince;
+    pid_t endedGroup = 0;  ///< 0: the program has not ended it
     std::vector<LeftProcess> left;
   };
 
@@ -80,7 +84,8 @@ class LeftProcesses final {
   std::optional<Adopted> describe(pid_t id) const;
   static bool belongsTo(const Adopted& process, int slot);
   bool mayBelongToRunning(const Adopted& process) const;
-  static void giveUp(pid_t id, Adopted& process, Slot& slot, std::string problem);
+  bool wasEnded(pid_t group) const;
+  static void giveUp(pid_t id, Adopted& process, Slot& slot, const std::string& batchFile, std::string problem);
 
   const ProcessMark& mark_;
   std::function<bool(pid_t)> isOwn_;

@@ -398,6 +398,7 @@ double PosixProcessLauncher::secondsToLook(const Slot& slot) const {
 /// Reaps the ended first process of the group and ends the processes that it left behind. The group is stopped first,
 /// so that none of them can end or start others between being listed and being killed.
 void PosixProcessLauncher::endRestOfGroup(Slot& slot) {
+  if (slot.overdue) left_->addEndedGroup(numberOf(slot), slot.group);
   ::kill(-slot.group, SIGSTOP);
   siginfo_t ignored{};
   while (::waitid(P_PID, static_cast<id_t>(slot.group), &ignored, WEXITED) < 0 && errno == EINTR) {
@@ -408,11 +409,10 @@ void PosixProcessLauncher::endRestOfGroup(Slot& slot) {
   }
   // After its first process is reaped, a group without others is gone; one with others keeps its number.
   if (::kill(-slot.group, 0) == 0) {
-    std::vector<FoundProcess> members = runningMembers(std::span(&slot.group, 1));
+    const std::vector<FoundProcess> members = runningMembers(std::span(&slot.group, 1));
     ::kill(-slot.group, SIGKILL);
     const bool isLast = slot.item + 1 == slot.commands.size();
-    if (!members.empty())
-      left_->addKilled(numberOf(slot), baseName(slot.commands[slot.item].file()), std::move(members));
+    if (!members.empty()) left_->addKilled(numberOf(slot), baseName(slot.commands[slot.item].file()), members);
     if (!isLast) awaitEndOfGroups(std::span(&slot.group, 1), kRestSeconds);  // the next item must not meet them
   }
   groupEntry(slot).store(0);

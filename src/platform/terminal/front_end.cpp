@@ -1,6 +1,7 @@
 #include "platform/terminal/front_end.h"
 
 #include <cstdlib>
+#include <cstring>
 #include <filesystem>
 #include <unistd.h>
 
@@ -32,6 +33,12 @@ MessageResult showMessage(std::string_view text, std::string_view title, Message
   if (signalState.liveLineDescriptor.exchange(-1) >= 0) shown.insert(0, kClearLine);
   return writeWhole(STDERR_FILENO, shown, kPatienceMilliseconds).error == 0 ? MessageResult::ok
                                                                             : MessageResult::notShown;
+}
+
+int writeAnswer(std::string_view text) {
+  const OutputResult result = writeWhole(STDOUT_FILENO, text);
+  if (result.error != 0) showMessage(std::string("Unable to write the answer: ") + std::strerror(result.error));
+  return result.error == 0 ? 0 : 1;
 }
 
 bool isUnattended() {

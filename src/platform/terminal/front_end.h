@@ -16,6 +16,10 @@ enum class MessageResult { notShown = 0, ok = 1 };
 /// pipe does not accept within a second is lost.
 MessageResult showMessage(std::string_view text, std::string_view title = {}, MessageType type = MessageType::error);
 
+/// Writes the answer to a question of the command line to standard output. Returns the exit code: 1, and a message, if
+/// that fails.
+int writeAnswer(std::string_view text);
+
 /// Whether nobody is watching: BUILDMODE is "NIGHT".
 bool isUnattended();
 

@@ -128,7 +128,16 @@ int TerminalLine::columns() {
 
 /// Opened once more, as standard error itself may be shared with programs that want to wait: a terminal whose
 /// connection hangs accepts part of a line, and the rest of it would stop the run.
-TerminalLine::TerminalLine() : descriptor_(::open("/proc/self/fd/2", O_WRONLY | O_NONBLOCK | O_NOCTTY | O_CLOEXEC)) {}
+TerminalLine::TerminalLine() {
+  constexpr int kFlags = O_WRONLY | O_NONBLOCK | O_NOCTTY | O_CLOEXEC;
+  descriptor_ = ::open("/proc/self/fd/2", kFlags);
+  if (descriptor_ >= 0) return;
+  // The terminal belongs to another user, as after su. That of the session can be opened nevertheless.
+  if (::tcgetsid(STDERR_FILENO) > 0) descriptor_ = ::open("/dev/tty", kFlags);
+  if (descriptor_ >= 0) return;
+  descriptor_ = ::fcntl(STDERR_FILENO, F_DUPFD_CLOEXEC, STDERR_FILENO + 1);
+  mayWait_ = true;
+}
 
 TerminalLine::~TerminalLine() {
   clear();
@@ -137,7 +146,11 @@ TerminalLine::~TerminalLine() {
 
 /// What a terminal does not accept at once is lost; the next line begins afresh.
 void TerminalLine::write(std::string_view text) const {
-  writeWhole(descriptor_, text, 0);
+  // A terminal that is ready takes one byte without waiting, whatever the descriptor's mode.
+  const std::size_t length = mayWait_ ? 1 : text.size();
+  while (!text.empty() && writeWhole(descriptor_, text.substr(0, length), 0).error == 0) {
+    text.remove_prefix(length);
+  }
 }
 
 void TerminalLine::show(std::string_view text) {

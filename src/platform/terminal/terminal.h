@@ -44,7 +44,8 @@ class TerminalLine final {
  private:
   void write(std::string_view text) const;
 
-  int descriptor_ = -1;  ///< of the terminal, for writing without ever waiting; -1: nothing is shown
+  int descriptor_ = -1;   ///< of the terminal; -1: nothing is shown
+  bool mayWait_ = false;  ///< a write of more than the terminal accepts would wait
   std::string shown_;
 };
 

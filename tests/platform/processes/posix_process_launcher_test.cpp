@@ -398,6 +398,7 @@ TEST_F(PosixProcessLauncherTest, ABatchThatRunsTooLongIsEndedWithAllThatItStarte
     EXPECT_EQ(finish(1), BatchStatus::failed);
     EXPECT_EQ(launcher_.failure(1).kind, Kind::timedOut);
     EXPECT_EQ(launcher_.failure(1).detail, "slow.sh was ended because it ran longer than 100 seconds");
+    EXPECT_EQ(launcher_.leftBehind(1), "") << "what was ended with its batch is none that it left";
     if (needsKill) {
       const pid_t grandchild = std::atoi(read("grandchild.pid").c_str());
       EXPECT_TRUE(waitUntil([&] { return !isRunning(grandchild); }));
