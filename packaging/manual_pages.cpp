@@ -52,7 +52,7 @@ std::string plain(std::string_view text) {
   return roff;
 }
 
-/// A line of Markdown: `code` becomes bold, *emphasis* italic, and of a link its text is left.
+/// A line of Markdown: `code` becomes bold, *emphasis* italic, and a link the name of the page.
 std::string fromMarkdown(std::string_view text) {
   std::string roff;
   std::size_t begin = 0;
@@ -61,7 +61,7 @@ std::string fromMarkdown(std::string_view text) {
     const char mark = text[begin];
     const std::size_t end = mark == '[' ? text.find("](", begin) : text.find(mark, begin + 1);
     if (mark == '[' && end != std::string_view::npos && text.find(')', end) != std::string_view::npos) {
-      roff += fromMarkdown(text.substr(begin + 1, end - begin - 1));
+      roff += fmt::format("the page on {} of the manual", fromMarkdown(text.substr(begin + 1, end - begin - 1)));
       begin = text.find(')', end) + 1;
     } else if ((mark == '`' || mark == '*') && end != std::string_view::npos && end > begin + 1) {
       roff += fmt::format("{}{}\\fR", mark == '`' ? "\\fB" : "\\fI", plain(text.substr(begin + 1, end - begin - 1)));
@@ -96,17 +96,61 @@ void keyword(const std::vector<std::string>& cells) {
   fmt::print(".\n{}\n", fromMarkdown(cells[5]));
 }
 
+constexpr std::string_view kExample = R"([MIREVO_PARAMETERS]
+  [MIREVO_SIMULATION_OPTION]
+    Option = 'optimisation'   // what the run is for
+    Title = 'Upper basin'
+    [SIMBATCH]
+      TqSEKdxListItemCount = 1
+      [SIMBATCHITEM_1]
+        BatchFileName = 'model/run.sh'
+      [/SIMBATCHITEM_1]
+    [/SIMBATCH]
+  [/MIREVO_SIMULATION_OPTION]
+[/MIREVO_PARAMETERS]
+)";
+
+std::string_view pathOf(std::string_view section) {
+  return section.substr(0, section.find('\n'));
+}
+
+/// The reference with each section beside the others of the section that it is in, whenever it is read.
+std::string reordered(std::string_view reference) {
+  constexpr std::string_view kHeading = "\n## ";
+  std::vector<std::string_view> sections;  // from the path on; the first is the introduction
+  while (true) {
+    const std::size_t end = reference.find(kHeading);
+    const std::string_view section = reference.substr(0, end);
+    const std::string_view path = pathOf(section);
+    const std::string_view parent = path.substr(0, path.rfind('/') + 1);
+    auto after = sections.end();
+    const auto isBeside = [&](std::string_view other) { return !parent.empty() && pathOf(other).starts_with(parent); };
+    if (const auto last = std::find_if(sections.rbegin(), sections.rend(), isBeside); last != sections.rend())
+      after = last.base();
+    sections.insert(after, section);
+    if (end == std::string_view::npos) break;
+    reference.remove_prefix(end + kHeading.size());
+  }
+  std::string page;
+  for (const std::string_view section : sections) page.append(page.empty() ? "" : kHeading).append(section);
+  return page;
+}
+
 int setupPage(std::string_view version) {
   header("mirevo-setup", 5, version, "setup file of a Mirevo run");
   fmt::print(".SH DESCRIPTION\n{}",
              "A text file that describes a run, by convention with the ending .kdx. A section is opened by\n"
              "[\\fISection\\fR] and closed by [/\\fISection\\fR]; in it are other sections, and a line\n"
-             "\\fIKeyword\\fR = \\fIvalue\\fR for each setting. What follows // in a line is a comment.\n");
+             "\\fIKeyword\\fR = \\fIvalue\\fR for each setting. What follows // in a line is a comment.\n"
+             "Its form, of which most is left out here:\n");
+  fmt::print(".PP\n.nf\n");
+  for (const std::string_view line : splitLines(kExample)) fmt::print("{}\n", plain(line));
+  fmt::print(".fi\n.PP\n");
   constexpr std::size_t kCells = 6;
   bool isSection = false;
   bool isListed = false;  // the line before belongs to a list item
   bool isBegun = false;   // what is before the first list is about the page itself
-  const std::string reference = setupReference();
+  const std::string reference = reordered(setupReference());
   for (const std::string_view line : splitLines(reference)) {
     isBegun = isBegun || line.starts_with("- ");
     if (!isBegun || line.starts_with("|---") || line.starts_with("| keyword |")) continue;

@@ -224,6 +224,11 @@ export function legend(look: Look, more: object = {}): object {
   };
 }
 
+/** Entries of a legend whose icon is the line as it is drawn, without the disc of a point. */
+export function lineEntries(names: string[]): object[] {
+  return names.map((name) => ({ name, itemStyle: { opacity: 0 }, lineStyle: { width: 'inherit' } }));
+}
+
 export function chart(plan: ChartPlan): Chart {
   const canvas = make('div', { class: 'canvas', role: 'img', 'aria-label': plan.title, style: `height: ${plan.height}px` });
   const note = make('p', { class: 'note' });

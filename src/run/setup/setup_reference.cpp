@@ -21,7 +21,7 @@ keyword rows; do not edit it.
   [file formats](file-formats.md) for how they are written. A file's name is relative to the setup file's folder, or
   absolute.
 - A *code* is one of a few values, given by its number or by its name between quotes, in upper or lower case:
-  `Algorithm_Type = 2` and `Algorithm_Type = 'DDS'` are the same. The names are below the table of their section; what has
+  `Algorithm_Type = 2` and `Algorithm_Type = 'DDS'` are the same. The names follow the keywords of their section; what has
   no number there has a name only. Where a code means no or yes, the names are `'no'` and `'yes'`;
   of another number the lowest bit counts, with a warning, unless the keyword says otherwise.
 - Unknown sections and keywords are not read; the run log warns of them and names the nearest known one.

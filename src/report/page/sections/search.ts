@@ -1,5 +1,5 @@
 // The course of the search, and what the evaluations tell of each parameter.
-import { axis, chart, legend, tip, tooltip, type Chart, type ChartPlan } from '../chart';
+import { axis, chart, legend, lineEntries, tip, tooltip, type Chart, type ChartPlan } from '../chart';
 import { variableParameters, type Maybe, type Parameter, type ReportData } from '../data';
 import { choice, shorten } from '../dom';
 import { count, number } from '../format';
@@ -211,7 +211,7 @@ function spreadPlan(data: ReportData, size: number): ChartPlan {
     zoom: 'x',
     switches: [{ key: 'log', label: 'Log', on: logable }],
     option: (look, is) => ({
-      legend: legend(look),
+      legend: legend(look, { data: lineEntries(variable.map(({ name }) => name)), itemWidth: 34 }),
       grid: { left: 24, right: 16, top: 36, bottom: 28 },
       xAxis: axis(look, { name: 'Evaluation', min: 'dataMin', max: 'dataMax', nameGap: 26 }),
       yAxis: axis(look, { log: is('log'), axisLabel: { formatter: (value: number) => `${number(value, 3)} %` } }),

@@ -1,5 +1,5 @@
 // Simulated against observed series: how well they fit, at which times they do not, and in which range of values.
-import { axis, chart, legend, timeZoom, tip, tooltip, type ChartPlan } from '../chart';
+import { axis, chart, legend, lineEntries, timeZoom, tip, tooltip, type ChartPlan } from '../chart';
 import { timesOf, type Figures, type Maybe, type ReportData, type Series } from '../data';
 import { shorten, table } from '../dom';
 import { count, moment, number } from '../format';
@@ -71,7 +71,7 @@ function hydrographPlan(data: ReportData, series: Series): ChartPlan {
       for (const { key, values } of simulated) source[key] = onLog(values, is('log'));
       return {
         dataset: { source, dimensions: ['time', ...Object.keys(source).filter((key) => key !== 'time')] },
-        legend: legend(look, { data: ['observed', ...simulated.map(({ name }) => name)] }),
+        legend: legend(look, { data: lineEntries(['observed', ...simulated.map(({ name }) => name)]), itemWidth: 34 }),
         axisPointer: { link: [{ xAxisIndex: 'all' }], lineStyle: { color: look.muted } },
         grid: [{ left: 64, right: 16, top: 36, height: 262, outerBoundsMode: 'none' }, { left: 64, right: 16, top: 338, height: 86, outerBoundsMode: 'none' }],
         xAxis: [
@@ -185,7 +185,7 @@ function durationPlan(data: ReportData, series: Series): ChartPlan {
     zoom: 'xy',
     switches: positive ? [{ key: 'log', label: 'Log', on: true }] : [],
     option: (look, is) => ({
-      legend: legend(look),
+      legend: legend(look, { data: lineEntries(curves.map(({ name }) => name)), itemWidth: 34 }),
       grid: { left: 26, right: 16, top: 36, bottom: 28 },
       xAxis: axis(look, { name: 'Time exceeded (%)', min: 0, max: 100, nameGap: 26 }),
       yAxis: axis(look, { name: unitOf(series), log: is('log'), nameGap: 44 }),

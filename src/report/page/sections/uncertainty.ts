@@ -1,5 +1,5 @@
 // The results of an uncertainty analysis: distributions, and the band of every simulated series.
-import { axis, chart, legend, timeZoom, tip, tooltip, type ChartPlan } from '../chart';
+import { axis, chart, legend, lineEntries, timeZoom, tip, tooltip, type ChartPlan } from '../chart';
 import { timesOf, variableParameters, type Band, type Maybe, type ReportData } from '../data';
 import { count, moment, number, percent } from '../format';
 import { finite, histogram, spaced, type Bin } from '../numbers';
@@ -98,7 +98,7 @@ function bandPlan(band: Band): ChartPlan {
       return {
         dataset: { source: { time: times, p5: scaled(band.p5), p50: scaled(band.p50), p95: scaled(band.p95), observed: scaled(band.observed) },
           dimensions: ['time', 'p5', 'p50', 'p95', 'observed'] },
-        legend: legend(look, { data: ['5 to 95 %', 'median', 'observed'] }),
+        legend: legend(look, { data: ['5 to 95 %', ...lineEntries(['median', 'observed'])], itemWidth: 34 }),
         grid: { left: 64, right: 16, top: 36, bottom: 72 },
         xAxis: [axis(look, { type: 'time', min: first, max: last })],
         yAxis: axis(look, { name: band.unit || 'Value', log: is('log'), nameGap: 48, ...(is('log') ? {} : { scale: false }) }),
