@@ -53,7 +53,7 @@ TEST(CommandLine, QuestionsAreAnsweredUnlessTheLastArgumentIsAFile) {
        "MIREVO_SIMULATION_OPTION/Title\n  Meaning: ", "Mirevo: Ignored: \"//x\"; --keyword is answered"},
       {"--keyword Title", 0, "MIREVO_SIMULATION_OPTION/Title\n  Meaning: ", ""},
       {"--keyword maxno", 1, "", "did you mean OPTIMISATION_ALGORITHM/STOPPING_CRITERIA/Max_No_Evaluations"},
-      {"--help >&-", 1, "", ""},
+      {"--help >&-", 1, "", "Mirevo: Unable to write the answer: "},
       {"--keywrd", 1, "", "Mirevo: Unknown option \"--keywrd\"\nMirevo: Usage: "},
   };
   for (const Case& each : cases) {
