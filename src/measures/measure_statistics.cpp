@@ -287,10 +287,10 @@ double selectStatistic(const MeasureStatistics& statistics, StatisticType type) 
   return statisticOf(type).value(statistics);
 }
 
-double valueOfPerfectFit(const OutputMeasure& measure, const ObservedSeries& observed) {
+double valueAgainst(const ObservedSeries& observed, std::span<const double> simulated, const OutputMeasure& measure) {
   MeasureStatistics statistics;
   statistics.times = observed.days;
-  statistics.simulatedValues = observed.values;
+  statistics.simulatedValues.assign(simulated.begin(), simulated.end());
   statistics.observedValues = observed.values;
   statistics.observationCount = observed.values.size();
   statistics.epsilon = kShareOfMean * std::abs(meanOf(observed.values));

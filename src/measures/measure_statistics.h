@@ -74,9 +74,8 @@ std::string describeLackOfObservations(const TimeSeriesObject& series, int item,
 /// The statistic that `Statistic_Type` selects, on its own scale.
 double selectStatistic(const MeasureStatistics& statistics, StatisticType type);
 
-/// The value of a measure of interface type 0 for a simulation that is the same as the observations; NaN if its
-/// statistic is undefined for these observations, whatever the model does.
-double valueOfPerfectFit(const OutputMeasure& measure, const ObservedSeries& observed);
+/// The value of a measure of interface type 0 for these simulated values at the times of the observations.
+double valueAgainst(const ObservedSeries& observed, std::span<const double> simulated, const OutputMeasure& measure);
 
 /// The value of a measure of interface type 0, as from selectStatistic().
 double measureValue(const OutputMeasure& measure, const EvaluationPeriod& period, TimeSeriesObject& simulation,

@@ -185,15 +185,28 @@ void SeriesTables::requireObservations(const ObservedSeries& observed, const Out
 }
 
 void SeriesTables::requireDefined(const ObservedSeries& observed, const OutputMeasure& measure) {
-  const bool isAsItIs = measure.transformation == ValueTransformation::none && !isCriterion(measure);
-  if (isAsItIs || std::isfinite(valueOfPerfectFit(measure, observed))) return;
+  if (measure.transformation == ValueTransformation::none && !isCriterion(measure)) return;
+  std::vector<double> rising(observed.values);
+  for (std::size_t i = 0; i < rising.size(); ++i) rising[i] += static_cast<double>(i);
+  if (observed.values.empty() || std::isfinite(valueAgainst(observed, observed.values, measure)) ||
+      std::isfinite(valueAgainst(observed, rising, measure))) {
+    return;
+  }
   const std::string& name = observationNames_[observationIndex_[observed.measure]];
-  fatalError(
-      "Error: Statistic undefined for output measure " + measure.name,
-      fmt::format("{}{}: the {} of item No. {} ({}) in the evaluation period cannot be computed, whatever the "
-                  "model does{}",
-                  measure.observation.fileLocation, name, describeStatistic(measure), measure.observation.itemNo,
-                  observation(observed.measure).itemName(measure.observation.itemNo), describeUndefined(measure)));
+  const std::string what =
+      fmt::format("the {} of item No. {} ({})", describeStatistic(measure), measure.observation.itemNo,
+                  observation(observed.measure).itemName(measure.observation.itemNo));
+  const bool areSame = std::ranges::all_of(observed.values, [&](double v) { return v == observed.values.front(); });
+  // Those that a run compares may be fewer, but no others.
+  if (areSame) {
+    fatalError("Error: Statistic undefined for output measure " + measure.name,
+               fmt::format("{}{}: {} in the evaluation period cannot be computed, whatever the model does{}",
+                           measure.observation.fileLocation, name, what, describeUndefined(measure)));
+  }
+  addWarning(measure.observation.fileLocation,
+             fmt::format("{}: {} cannot be computed where all of its observations are compared, and a model run that "
+                         "does so has failed{}",
+                         name, what, describeUndefined(measure)));
 }
 
 void SeriesTables::warnOfMarkers(const ObservedSeries& observed, const OutputMeasure& measure) {

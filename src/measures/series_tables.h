@@ -60,13 +60,14 @@ class SeriesTables final {
   /// Throws FatalError, as the first model run would, if there are none.
   void requireObservations(const ObservedSeries& observed, const OutputMeasure& measure,
                            const EvaluationPeriod& period);
-  /// If observations are a usual marker of missing values that is not marked as one.
-  /// Throws FatalError if the statistic cannot be computed for these observations, whatever the model does.
+  /// Throws FatalError if the statistic cannot be computed for these observations, whatever the model does; warns if it
+  /// cannot be where all of them are compared.
   void requireDefined(const ObservedSeries& observed, const OutputMeasure& measure);
   /// Of a file with several items of which the setup names none.
   void warnOfDefaultItem(const TimeSeriesObject& series, const SeriesReference& reference, const std::string& name);
   /// Unless it has been given with another location, as for measures that compare the same item.
   void addWarning(const std::string& location, const std::string& text);
+  /// If observations are a usual marker of missing values that is not marked as one.
   void warnOfMarkers(const ObservedSeries& observed, const OutputMeasure& measure);
   void checkItems(std::span<const OutputMeasure> measures, const EvaluationPeriod& period, bool isForRuns);
 

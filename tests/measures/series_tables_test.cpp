@@ -73,8 +73,15 @@ TEST_F(SeriesTablesTest, ObservationsOfWhichACriterionIsUndefinedEndTheRunBefore
   nse.statisticType = findStatistic("NSE").value();
   EXPECT_THAT(refusalOf([&] { SeriesTables::MirevoTSobjectInit(std::vector{nse}, kPeriod); }),
               HasSubstr("cannot be computed, whatever the model does, as it is if the observed values do not vary"));
-  nse.statisticType = findStatistic("mean absolute error").value();
-  EXPECT_NO_THROW(SeriesTables::MirevoTSobjectInit(std::vector{nse}, kPeriod));
+  for (const char* name : {"mean absolute error", "index of agreement"}) {
+    nse.statisticType = findStatistic(name).value();
+    EXPECT_THAT(SeriesTables::MirevoTSobjectInit(std::vector{nse}, kPeriod).warnings(), ElementsAre());
+  }
+  // A run need not compare them all.
+  folder_.write("flat.csv", "time,Q\n2001-01-01,2\n2001-01-02,-3\n");
+  nse.statisticType = findStatistic("log-NSE").value();
+  EXPECT_THAT(SeriesTables::MirevoTSobjectInit(std::vector{nse}, kPeriod).warnings(),
+              ElementsAre(HasSubstr("cannot be computed where all of its observations are compared")));
 }
 
 TEST_F(SeriesTablesTest, SetupFailuresEndTheRun) {

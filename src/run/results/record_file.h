@@ -49,6 +49,8 @@ class RecordFile final {
   bool isAtItsPath(std::string& reason) const;
 
   bool isOpen() const { return descriptor_ >= 0; }
+  /// Whether an append has failed, after which further records are dropped.
+  bool hasFailed() const { return failed_; }
   const std::string& path() const { return path_; }
   int descriptor() const { return descriptor_; }
   /// Bytes up to the end of the last record; it begins its own length before.

@@ -91,7 +91,8 @@ LostRows countLostRows(const ResultTable& table, const RowChecksums& checksums, 
   for (const auto& [number, checksum] : checksums) {
     if (isLost(number) && damaged.count(number) == 0) missing.insert(number);
   }
-  const std::size_t cut = table.hasCutRow ? 1 : 0;  // its number may be cut, too
+  // Its number may be cut, too. Where no row is missing it is none of the run's.
+  const std::size_t cut = table.hasCutRow && std::ssize(whole) < planned ? 1 : 0;
   return {static_cast<std::size_t>(std::count_if(damaged.begin(), damaged.end(), isLost)) + cut,
           missing.size() - std::min(missing.size(), cut)};
 }
@@ -294,8 +295,11 @@ bool RestartSettingsFile::writeText(std::string& reason) {
 /// Whether what is at the path is certainly not what was written.
 bool RestartSettingsFile::isAnother() const {
   struct stat status {};
-  return ::lstat(path_.c_str(), &status) == 0 &&
-         ((inode_ != 0 && status.st_ino != inode_) || status.st_size != std::ssize(text_));
+  if (::lstat(path_.c_str(), &status) != 0) return false;
+  if (inode_ != 0 && status.st_ino == inode_ && status.st_size == std::ssize(text_)) return false;
+  // Some file systems make inode numbers up.
+  std::string ignored;
+  return readTextFile(path_, ignored) != text_;
 }
 
 }  // namespace mirevo

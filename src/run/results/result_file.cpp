@@ -87,10 +87,12 @@ bool ResultFile::finish(std::span<const std::string> closingLines, std::string& 
   const std::string closing = commentLines(closingLines);
   std::string again;
   if (isInOrder() && aggregates_.empty()) {
-    const bool isAppended = file_.tryAppend(closing, reason);
-    const bool isClosed = file_.tryClose(isAppended ? reason : again);
-    const bool areChecksumsClosed = checksums_.tryClose(isAppended && isClosed ? reason : again);
-    return isAppended && isClosed && areChecksumsClosed;
+    // After a failure the run has ended with an error already.
+    const bool isWhole = file_.hasFailed() || readAsWritten(reason).has_value();
+    const bool isAppended = file_.tryAppend(closing, isWhole ? reason : again);
+    const bool isClosed = file_.tryClose(isWhole && isAppended ? reason : again);
+    const bool areChecksumsClosed = checksums_.tryClose(isWhole && isAppended && isClosed ? reason : again);
+    return isWhole && isAppended && isClosed && areChecksumsClosed;
   }
   const bool isRewritten = rewriteInOrder(closing, reason);
   if (!isRewritten) file_.tryAppend(closing, again);  // better out of order than without an end
@@ -111,8 +113,8 @@ bool ResultFile::hasRowsAsWritten(std::string_view content, std::string& reason)
       continue;
     }
     reason = fmt::format(
-        "another program has changed it: the row of evaluation No. {} is not where and as it was written. The file is "
-        "left as it is, and a restart tells of rows that do not hold",
+        "another program has changed it: the row of evaluation No. {} is not where and as it was written. Its rows are "
+        "left as they are, and a restart tells of those that do not hold",
         place.number);
     return false;
   }
@@ -151,15 +153,22 @@ std::string ResultFile::linesOfOthers(std::string_view content) const {
   return lines;
 }
 
-bool ResultFile::rewriteInOrder(std::string_view closing, std::string& reason) {
-  if (!file_.isAtItsPath(reason)) return false;
-  const auto content = readTextFile(path(), reason);
-  if (!content) return false;
+/// The file's content, if it is still this file and each row is where and as it was written.
+std::optional<std::string> ResultFile::readAsWritten(std::string& reason) const {
+  if (!file_.isAtItsPath(reason)) return std::nullopt;
+  auto content = readTextFile(path(), reason);
+  if (!content) return std::nullopt;
   if (std::ssize(*content) < file_.size()) {
     reason = shortenedText(file_.size(), std::ssize(*content));
-    return false;
+    return std::nullopt;
   }
-  if (!hasRowsAsWritten(*content, reason)) return false;
+  if (!hasRowsAsWritten(*content, reason)) return std::nullopt;
+  return content;
+}
+
+bool ResultFile::rewriteInOrder(std::string_view closing, std::string& reason) {
+  const auto content = readAsWritten(reason);
+  if (!content) return false;
   const std::string others = linesOfOthers(*content);
   std::stable_sort(rows_.begin(), rows_.end(), [](const Place& a, const Place& b) { return a.number < b.number; });
   std::vector<RowChecksum> checksums = checksumsOfRows();

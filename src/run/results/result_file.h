@@ -3,6 +3,7 @@
 #include <cstdint>
 #include <map>
 #include <span>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -53,6 +54,7 @@ class ResultFile final {
     std::uint64_t checksum;
   };
   bool isInOrder() const;
+  std::optional<std::string> readAsWritten(std::string& reason) const;
   bool hasRowsAsWritten(std::string_view content, std::string& reason) const;
   std::string settleLine(std::string_view content, Place& place) const;
   std::vector<RowChecksum> checksumsOfRows() const;

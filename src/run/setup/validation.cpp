@@ -91,7 +91,8 @@ std::optional<SettingRefusal> validateMeasurementNumber(const OutputMeasure& mea
 
 std::optional<SettingRefusal> validateValueTransformation(const OutputMeasure& measure) {
   const Statistic& statistic = statisticOf(measure.statisticType);
-  if (measure.transformation == ValueTransformation::none) return std::nullopt;
+  const bool isOfSeries = measure.interfaceType == InterfaceType::timeSeries;
+  if (!isOfSeries || measure.transformation == ValueTransformation::none) return std::nullopt;
   std::string_view reason;
   if (statistic.transformation != ValueTransformation::none || statistic.usesEpsilon) {
     reason = "has a transformation of its own";

@@ -128,8 +128,11 @@ TEST_F(RestartSettingsTest, AFileThatIsRemovedDuringTheRunIsPutBack) {
   EXPECT_EQ(folder_.read("settings.dat"), written);
   std::filesystem::rename(folder_.write("other", written), folder_ / "settings.dat");
   now = 5.0;
+  EXPECT_EQ(file.keep(), "") << "it is another file with the same content";
+  std::filesystem::rename(folder_.write("other", written + "# a remark\n"), folder_ / "settings.dat");
+  now = 6.5;
   EXPECT_THAT(file.keep(), HasSubstr("Another program has replaced or changed"));
-  now = 7.0;
+  now = 8.0;
   EXPECT_EQ(file.keep(), "");
 }
 

@@ -174,9 +174,9 @@ TEST_F(ResultFileTest, OneThatAnotherFileReplacesIsNotCalledRemoved) {
 }
 
 TEST_F(ResultFileTest, OneThatAnotherProgramHasWrittenAgainIsLeftAsItIs) {
-  for (const bool isReplaced : {true, false}) {
+  for (const auto& [isReplaced, isInOrder] : {std::pair{true, false}, {false, false}, {true, true}, {false, true}}) {
     open();
-    for (const int number : {2, 1}) add(success(number, 1, 1), 1);
+    for (const int number : {isInOrder ? 1 : 2, isInOrder ? 2 : 1}) add(success(number, 1, 1), 1);
     std::string text = folder_.read("r.dat");
     text.insert(text.find("2\tOK"), "3\tOK\t1\t1\t1\t1\n");
     const std::string written = folder_.write(isReplaced ? "other" : "r.dat", text);
