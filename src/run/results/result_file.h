@@ -2,8 +2,8 @@
 
 #include <cstdint>
 #include <map>
-#include <span>
 #include <optional>
+#include <span>
 #include <string>
 #include <string_view>
 #include <utility>
