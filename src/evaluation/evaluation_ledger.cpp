@@ -38,7 +38,7 @@ void EvaluationLedger::begin(std::span<const ParameterSet> sets, DispatchMode mo
 }
 
 void EvaluationLedger::replay(std::size_t place, EvaluationResult result) {
-  ComparisonFindings found = runComparison_.take(result);
+  ComparisonFindings found = runComparison_.take(result, isFinalRun_);
   observer_.evaluationReplayed(sets_[place], result);
   tell(std::move(found));
   store(place, std::move(result));
@@ -96,7 +96,7 @@ void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::s
     observer_.message(completedText(result));
     return finishRepeated(place, std::move(*known), std::move(result));
   }
-  ComparisonFindings found = runComparison_.take(result);
+  ComparisonFindings found = runComparison_.take(result, isFinalRun_);
   observer_.recordEvaluation(sets_[place], result);
   observer_.message(completedText(result));
   observer_.evaluationFinished(sets_[place], result);

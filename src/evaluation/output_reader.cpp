@@ -60,6 +60,11 @@ OutputReader::OutputReader(const ModelDescription& description, const ObjectiveA
       sources_(measureSources(description.measures, description.measureFile, description.baseFolder)),
       series_(SeriesTables::MirevoTSobjectInit(description.measures, description.period, description.isForRuns)),
       shownMeasures_(measuresOfDistinctPairs(description.measures)) {
+  for (std::size_t i = 0; i < sources_.size(); ++i) {
+    const ComparedItems& items = series_.comparedItems(i);
+    if (!items.simulated.empty()) sources_[i].simulated += ", " + items.simulated;
+    if (!items.observed.empty()) sources_[i].observed += ", " + items.observed;
+  }
   for (const OutputMeasure& measure : description.measures) {
     if (measure.interfaceType != InterfaceType::measureFile) continue;
     numbersNeeded_ = std::max(numbersNeeded_, static_cast<std::size_t>(measure.measurementNo));

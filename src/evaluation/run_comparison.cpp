@@ -9,6 +9,7 @@
 #include <fmt/core.h>
 
 #include "common/calendar.h"
+#include "common/run_files.h"
 #include "common/text.h"
 
 namespace mirevo {
@@ -76,9 +77,24 @@ std::vector<MeasureSource> measureSources(std::span<const OutputMeasure> measure
     const bool isSeries = measure.interfaceType == InterfaceType::timeSeries;
     std::string file(trimTrailing(isSeries ? measure.simulation.fileName : measureFile));
     if (file.starts_with(baseFolder + "/")) file.erase(0, baseFolder.size() + 1);
-    sources.push_back({std::string(trimTrailing(measure.name)), std::move(file), isSeries});
+    MeasureSource& source = sources.emplace_back();
+    source = {std::string(trimTrailing(measure.name)), std::move(file), isSeries};
+    if (!isSeries) continue;
+    source.simulated = source.fileName;
+    source.observed = fileNameOf(trimTrailing(measure.observation.fileName));
   }
   return sources;
+}
+
+std::string comparisonText(const MeasureSource& source, const MeasurePairs& pairs) {
+  const FileForm& file = pairs.file;
+  const auto date = [](std::int64_t second) { return formatDate(dateOfSecond(second)); };
+  std::string span;
+  if (file.lastStep > file.firstStep) span = fmt::format(", {} to {}", date(file.firstStep), date(file.lastStep));
+  return fmt::format("{}: {}{} with {}: {}, {} without a simulated value, {} to {}; {}; {}", source.name,
+                     source.simulated, span, source.observed, countText(pairs.count, "pair"),
+                     countText(pairs.missingCount, "observation"), date(pairs.first), date(pairs.last),
+                     rangeText("observed", pairs.observed), rangeText("simulated", pairs.simulated));
 }
 
 std::size_t pairedCount(std::span<const MeasureSource> sources) {
@@ -184,14 +200,14 @@ bool RunComparison::judge(int number, EvaluationResult& result) const {
   return true;
 }
 
-ComparisonFindings RunComparison::take(EvaluationResult& result) {
+ComparisonFindings RunComparison::take(EvaluationResult& result, bool keepsPairs) {
   ComparisonFindings found;
   if (sources_.empty()) return found;
   if (!result.ok()) result.pairs.clear();
   std::erase_if(result.pairs, [this](const MeasurePairs& pairs) { return pairs.measure >= sources_.size(); });
   anyHasSucceeded_ = anyHasSucceeded_ || result.ok();
   if (firstNumber_ != 0) {
-    if (!compare(result.number, result.pairs, found)) result.pairs.clear();
+    if (!compare(result.number, result.pairs, found) && !keepsPairs) result.pairs.clear();
     return found;
   }
   waiting_[result.number] = result.pairs;
@@ -235,11 +251,7 @@ std::vector<std::string> RunComparison::linesOfFirst() const {
     const std::string file = "   " + describe(pairs.file, source);
     if (std::find(files.begin(), files.end(), file) == files.end()) files.push_back(file);
     if (!source.isSeries) continue;
-    lines.push_back(fmt::format("   {}: {}, {} without a simulated value, {} to {}", source.name,
-                                countText(pairs.count, "pair"), countText(pairs.missingCount, "observation"),
-                                formatDate(dateOfSecond(pairs.first)), formatDate(dateOfSecond(pairs.last))));
-    lines.push_back(
-        fmt::format("      {}; {}", rangeText("observed", pairs.observed), rangeText("simulated", pairs.simulated)));
+    lines.push_back("   " + comparisonText(source, pairs));
   }
   if (lines.size() == 1) lines.clear();
   lines.push_back(fmt::format("Files that evaluation No. {}, the first successful run, wrote:", firstNumber_));

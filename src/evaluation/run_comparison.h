@@ -17,11 +17,16 @@ struct MeasureSource {
   std::string name;      ///< of the measure
   std::string fileName;  ///< that the model writes, below the base folder
   bool isSeries = true;
+  std::string simulated = {};  ///< of a series, what is compared: "simulated.csv, item No. 1 (discharge)"
+  std::string observed = {};   ///< with what, and the time span of that file
 };
 
 /// One per measure. `measureFile` is that of the measures of interface type 1.
 std::vector<MeasureSource> measureSources(std::span<const OutputMeasure> measures, const std::string& measureFile,
                                           const std::string& baseFolder);
+
+/// One line for people: what a measure compares, and the pairs and values of a model run; of one that compares series.
+std::string comparisonText(const MeasureSource& source, const MeasurePairs& pairs);
 
 /// How many MeasurePairs a successful run has.
 std::size_t pairedCount(std::span<const MeasureSource> sources);
@@ -106,8 +111,8 @@ class RunComparison final {
 
   /// Takes a finished evaluation, in any order; each number once. Keeps its pairs only if they are needed to compare
   /// the evaluations of the run again: those of the first successful run, of runs that differ, and of runs that ended
-  /// before the first successful one was known.
-  ComparisonFindings take(EvaluationResult& result);
+  /// before the first successful one was known; and if `keepsPairs`.
+  ComparisonFindings take(EvaluationResult& result, bool keepsPairs = false);
   /// Whether no run may be started beside another, as what it is judged by is not known.
   bool isAwaited() const {
     return (rules_.requiresShare && firstNumber_ == 0) || (rules_.requiresProof && !anyHasSucceeded_);

@@ -14,6 +14,11 @@ FileForm formOfSeries(const TimeSeriesObject& series, const EvaluationPeriod& pe
   const std::optional<DateRecord> start = series.startTime();
   if (!start) return form;
   const std::span<const double> times = series.times();
+  const std::int64_t origin = secondNumber(*start);
+  if (!times.empty()) {
+    form.firstStep = secondAfter(origin, times.front());
+    form.lastStep = secondAfter(origin, times.back());
+  }
   const double first = daysSince(*start, period.start);
   const double last = daysSince(*start, period.end);
   const auto begin = std::lower_bound(times.begin(), times.end(), first - kSameTimeDays);
@@ -31,7 +36,6 @@ FileForm formOfSeries(const TimeSeriesObject& series, const EvaluationPeriod& pe
     widest = step + 1;
   }
   if (widest == to) return form;
-  const std::int64_t origin = secondNumber(*start);
   form.gapStart = secondAfter(origin, widest[-1]);
   form.gapEnd = secondAfter(origin, *widest);
   return form;

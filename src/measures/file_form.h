@@ -13,6 +13,9 @@ struct FileForm {
   bool endsLine = true;         ///< the last line has an end; true for a format without lines
   std::size_t numberCount = 0;  ///< of an output-measure file
   std::size_t stepCount = 0;    ///< of a series: time steps in the evaluation period
+  /// secondNumber() of the first and the last time step of a series; equal, and 0, if they are not known.
+  std::int64_t firstStep = 0;
+  std::int64_t lastStep = 0;
   /// secondNumber() of the two successive steps that are farthest apart, the first such, of those between which a part
   /// of the period lies; equal without any.
   std::int64_t gapStart = 0;

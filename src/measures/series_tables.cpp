@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cassert>
 #include <cmath>
+#include <cstdint>
 #include <filesystem>
 #include <new>
 #include <system_error>
@@ -14,6 +15,7 @@
 #include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/text.h"
+#include "measures/dates.h"
 #include "measures/measure_statistics.h"
 #include "measures/observed_series.h"
 #include "measures/statistics.h"
@@ -72,6 +74,18 @@ std::uintmax_t sizeOf(const std::string& path) {
   std::error_code failed;
   const std::uintmax_t size = std::filesystem::file_size(path, failed);
   return failed ? 0 : size;
+}
+
+std::string itemText(const TimeSeriesObject& series, const SeriesReference& reference) {
+  return fmt::format("item No. {} ({})", reference.itemNo, series.itemName(reference.itemNo));
+}
+
+std::string spanText(const TimeSeriesObject& series) {
+  const std::optional<DateRecord> start = series.startTime();
+  if (!start || series.times().empty()) return {};
+  const std::int64_t first = secondNumber(*start);
+  return fmt::format(", {} to {}", formatDate(dateOfSecond(secondAfter(first, series.times().front()))),
+                     formatDate(dateOfSecond(secondAfter(first, series.times().back()))));
 }
 
 }  // namespace
@@ -146,6 +160,7 @@ SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> mea
 
 void SeriesTables::checkItems(std::span<const OutputMeasure> measures, const EvaluationPeriod& period, bool isForRuns) {
   needsPairs_.assign(measures.size(), false);
+  comparedItems_.assign(measures.size(), {});
   for (std::size_t i = 0; i < measures.size(); ++i) {
     if (observationIndex_[i] == kNoSeries) continue;
     requireItem(observation(i), measures[i].observation);
@@ -154,6 +169,7 @@ void SeriesTables::checkItems(std::span<const OutputMeasure> measures, const Eva
       requireObservations(observed, measures[i], period);
       requireDefined(observed, measures[i]);
     }
+    comparedItems_[i].observed = itemText(observation(i), measures[i].observation) + spanText(observation(i));
     warnOfMarkers(observed, measures[i]);
     warnOfDefaultItem(observation(i), measures[i].observation, observationNames_[observationIndex_[i]]);
     // Files in the base folder that have no time steps yet tell nothing about their columns.
@@ -162,6 +178,7 @@ void SeriesTables::checkItems(std::span<const OutputMeasure> measures, const Eva
       continue;
     }
     requireItem(simulation(i), measures[i].simulation);
+    comparedItems_[i].simulated = itemText(simulation(i), measures[i].simulation);
     warnOfDefaultItem(simulation(i), measures[i].simulation, simulationNames_[simulationIndex_[i]]);
     needsPairs_[i] = hasPairs(measures[i], period, simulation(i), observation(i));
   }

@@ -15,6 +15,13 @@ namespace mirevo {
 class ReadingWatch;
 struct ObservedSeries;
 
+/// What a measure compares, for people, as it was found at the start: "item No. 1 (discharge)". Empty if it compares no
+/// series; the simulated item also if its file has no time step yet.
+struct ComparedItems {
+  std::string simulated;
+  std::string observed;  ///< with the time span of its file
+};
+
 /// The opened time-series files of the run: every distinct observation file, open for the whole run, and every distinct
 /// simulation file, open only while the measures of one evaluation are computed.
 class SeriesTables final {
@@ -47,6 +54,7 @@ class SeriesTables final {
   TimeSeriesObject& simulation(std::size_t measure);
   /// Which of simulationFileNames() that is.
   std::size_t simulationIndex(std::size_t measure) const { return simulationIndex_.at(measure); }
+  const ComparedItems& comparedItems(std::size_t measure) const { return comparedItems_.at(measure); }
   /// What seems to be meant in another way in files as they were found at the start, with their locations in the setup.
   const std::vector<std::string>& warnings() const { return warnings_; }
   /// Whether a model run without a simulated value for any observation of the measure in the period is the run's own
@@ -76,6 +84,7 @@ class SeriesTables final {
   std::vector<std::size_t> observationIndex_;  ///< one per measure, 0-based
   std::vector<std::size_t> simulationIndex_;
   std::vector<bool> needsPairs_;                   ///< one per measure
+  std::vector<ComparedItems> comparedItems_;       ///< one per measure
   std::vector<std::vector<int>> simulationItems_;  ///< one per simulation file: the item numbers in use
   std::vector<std::uintmax_t> usualSizes_;         ///< one per simulation file: as it was found at the start
   std::shared_ptr<SeriesReading> reading_;

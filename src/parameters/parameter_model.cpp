@@ -213,4 +213,37 @@ Feasibility ParameterModel::feasibility() {
       hasConstraints);
 }
 
+std::vector<double> allModelValues(ParameterModel& model, std::span<const double> variable) {
+  const std::vector<ModelParameter>& parameters = model.parameters();
+  ParameterSet set;
+  std::size_t next = 0;
+  bool failed = false;
+  for (const ModelParameter& parameter : parameters) {
+    if (parameter.parameterType != ParameterType::variable) continue;
+    set.push_back(TransformParameterValue(variable[next++], parameter.lowerBound, parameter.transformationType,
+                                          TransformDirection::forward, failed));
+  }
+  const auto mapped = model.MapToModelValues(set);
+  const auto* values = std::get_if<std::span<const double>>(&mapped);
+  std::vector<double> all(parameters.size(), std::numeric_limits<double>::quiet_NaN());
+  if (values != nullptr && !failed) all.assign(values->begin(), values->end());
+  next = 0;
+  for (std::size_t i = 0; i < all.size(); ++i) {  // exactly, where the transformation rounds
+    if (parameters[i].parameterType == ParameterType::variable) all[i] = variable[next++];
+  }
+  return all;
+}
+
+std::vector<std::string> otherValueTexts(ParameterModel& model, std::span<const double> variable) {
+  const std::vector<double> values = allModelValues(model, variable);
+  std::vector<std::string> texts;
+  for (std::size_t i = 0; i < values.size(); ++i) {
+    const ModelParameter& parameter = model.parameters()[i];
+    if (parameter.parameterType == ParameterType::variable) continue;
+    const char* const kind = parameter.parameterType == ParameterType::fixed ? "fixed" : "dependent";
+    texts.push_back(fmt::format("{} = {} ({})", parameter.name, formatReal(values[i]), kind));
+  }
+  return texts;
+}
+
 }  // namespace mirevo

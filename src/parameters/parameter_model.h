@@ -51,4 +51,11 @@ class ParameterModel final {
   std::unique_ptr<Implementation> implementation_;
 };
 
+/// All parameters on the model scale, in setup order, for values of the variable ones on that scale; NaN where they
+/// cannot be had.
+std::vector<double> allModelValues(ParameterModel& model, std::span<const double> variable);
+
+/// For people, the parameters that are not variable: "K = 3 (fixed)".
+std::vector<std::string> otherValueTexts(ParameterModel& model, std::span<const double> variable);
+
 }  // namespace mirevo

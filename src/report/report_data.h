@@ -7,6 +7,7 @@
 #include <string>
 #include <vector>
 
+#include "evaluation/evaluation_result.h"
 #include "report/failure_reasons.h"
 #include "run/results/run_record.h"
 #include "run/results/series_table.h"
@@ -65,6 +66,15 @@ struct ReportedObjective {
   std::string name;
   double initial = std::numeric_limits<double>::quiet_NaN();
   double best = std::numeric_limits<double>::quiet_NaN();
+};
+
+/// What a measure compares, and the values in its pairs.
+struct ReportedComparison {
+  std::string measure;
+  RunRecord::Compared items;
+  MeasurePairs pairs;                          ///< of the best evaluation, else of the first successful run
+  int number = 0;                              ///< of that evaluation
+  std::optional<ValueSummary> simulatedFirst;  ///< by the first successful run, if `pairs` are those of the best
 };
 
 /// The evaluations in the order of their numbers, column by column; failed ones hold NaN.
@@ -127,6 +137,7 @@ struct ReportData {
   std::vector<ReportedParameter> parameters;
   std::vector<ReportedMeasure> measures;
   std::vector<ReportedObjective> objectives;
+  std::vector<ReportedComparison> comparisons;
   std::optional<ShownEvaluation> best;
   std::optional<int> initialNumber;    ///< the evaluation that gives the initial values of the measures
   bool isOfInitialParameters = false;  ///< it has the initial parameters; else it is the first that succeeded

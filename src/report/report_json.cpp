@@ -170,6 +170,27 @@ void writeSeries(JsonWriter& json, const ReportData& data) {
   json.endArray();
 }
 
+void writeValues(JsonWriter& json, std::string_view name, const ValueSummary& values) {
+  json.key(name).beginArray().number(values.least).number(values.mean).number(values.largest).endArray();
+}
+
+void writeComparisons(JsonWriter& json, const ReportData& data) {
+  json.key("comparisons").beginArray();
+  for (const ReportedComparison& comparison : data.comparisons) {
+    const MeasurePairs& pairs = comparison.pairs;
+    json.beginObject().member("measure", comparison.measure).member("evaluation", comparison.number);
+    json.member("simulatedItem", comparison.items.simulated).member("observedItem", comparison.items.observed);
+    json.member("pairs", pairs.count).member("missing", pairs.missingCount);
+    json.key("span").beginArray().integer(epochMilliseconds(pairs.first)).integer(epochMilliseconds(pairs.last));
+    json.endArray();
+    writeValues(json, "observed", pairs.observed);
+    writeValues(json, "simulated", pairs.simulated);
+    if (comparison.simulatedFirst) writeValues(json, "simulatedFirst", *comparison.simulatedFirst);
+    json.endObject();
+  }
+  json.endArray();
+}
+
 void writeBands(JsonWriter& json, const ReportData& data) {
   json.key("band").beginArray();
   for (const ReportedBand& band : data.bands) {
@@ -227,6 +248,7 @@ std::string reportJson(const ReportData& data) {
   writeRun(json, data);
   writeParameters(json, data);
   writeMeasures(json, data);
+  writeComparisons(json, data);
   json.key("initialNumber");
   if (data.initialNumber) {
     json.integer(*data.initialNumber);

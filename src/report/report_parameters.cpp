@@ -3,36 +3,12 @@
 #include <cmath>
 #include <cstddef>
 #include <limits>
-#include <span>
 #include <string>
-#include <variant>
 
 namespace mirevo {
 namespace {
 
 constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
-
-/// All parameters on the model scale for values of the variable ones; NaN where they cannot be had.
-std::vector<double> allParameters(const RunConfig& config, ParameterModel& parameters,
-                                  std::span<const double> variable) {
-  ParameterSet set;
-  std::size_t next = 0;
-  bool failed = false;
-  for (const ModelParameter& parameter : config.parameters) {
-    if (parameter.parameterType != ParameterType::variable) continue;
-    set.push_back(TransformParameterValue(variable[next++], parameter.lowerBound, parameter.transformationType,
-                                          TransformDirection::forward, failed));
-  }
-  const auto mapped = parameters.MapToModelValues(set);
-  const auto* values = std::get_if<std::span<const double>>(&mapped);
-  std::vector<double> all(config.parameters.size(), kNaN);
-  if (values != nullptr && !failed) all.assign(values->begin(), values->end());
-  next = 0;
-  for (std::size_t i = 0; i < all.size(); ++i) {  // exactly, where the transformation rounds
-    if (config.parameters[i].parameterType == ParameterType::variable) all[i] = variable[next++];
-  }
-  return all;
-}
 
 /// Whether a value lies within a hundredth of the range of a bound, on the scale on which the parameter is searched.
 std::string nearBound(const ModelParameter& parameter, double value) {
@@ -52,9 +28,9 @@ std::string nearBound(const ModelParameter& parameter, double value) {
 std::vector<ReportedParameter> reportedParameters(const RunConfig& config, ParameterModel& parameters,
                                                   const ResultRow* best) {
   const SearchSpace& space = parameters.searchSpace();
-  const std::vector<double> startValues = allParameters(config, parameters, ToModelScale(space, space.initial));
+  const std::vector<double> startValues = allModelValues(parameters, ToModelScale(space, space.initial));
   std::vector<double> bestValues(config.parameters.size(), kNaN);
-  if (best != nullptr) bestValues = allParameters(config, parameters, best->parameters);
+  if (best != nullptr) bestValues = allModelValues(parameters, best->parameters);
   std::vector<ReportedParameter> all;
   for (std::size_t i = 0; i < config.parameters.size(); ++i) {
     const ModelParameter& parameter = config.parameters[i];

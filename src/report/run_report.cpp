@@ -62,6 +62,7 @@ class ReportBuilder final {
   void addMeasures();
   PairsByNumber pairsOfRuns() const;
   void notePairsThatAreLost(const PairsByNumber& pairs);
+  void addComparisons();
   void noteDifferencesOfBest();
   void addFailures();
   void addSeries();
@@ -125,6 +126,7 @@ ReportData ReportBuilder::build() {
   findBestAndInitial();
   data_.parameters = reportedParameters(config_, parameters_, best_);
   addMeasures();
+  addComparisons();
   noteDifferencesOfBest();
   addFailures();
   addSeries();
@@ -256,6 +258,30 @@ void ReportBuilder::addMeasures() {
   for (std::size_t i = 0; i < config_.objectives.size(); ++i) {
     data_.objectives.push_back({config_.objectives[i].name, valueOf(initial_, &ResultRow::objectives, i),
                                 valueOf(best_, &ResultRow::objectives, i)});
+  }
+}
+
+/// Of the best evaluation its own pairs or those of another model run of its set, as a search ends with one.
+void ReportBuilder::addComparisons() {
+  const PairsByNumber all = pairsOfRuns();
+  if (all.empty()) return;
+  const auto& [firstNumber, first] = *all.begin();
+  auto shown = all.begin();
+  for (auto entry = all.begin(); best_ != nullptr && entry != all.end(); ++entry) {
+    const ResultRow* const row = rowOf(entry->first);
+    if (row != nullptr && row->parameters == best_->parameters) shown = entry;
+  }
+  for (const MeasurePairs& pairs : shown->second) {
+    if (pairs.measure >= config_.measures.size() || pairs.count == 0) continue;
+    ReportedComparison& comparison = data_.comparisons.emplace_back();
+    comparison.measure = config_.measures[pairs.measure].name;
+    comparison.pairs = pairs;
+    comparison.number = shown->first;
+    const auto items = sources_.record.compared.find(static_cast<int>(pairs.measure) + 1);
+    if (items != sources_.record.compared.end()) comparison.items = items->second;
+    const auto same = std::find_if(first.begin(), first.end(),
+                                   [&pairs](const MeasurePairs& other) { return other.measure == pairs.measure; });
+    if (shown->first != firstNumber && same != first.end()) comparison.simulatedFirst = same->simulated;
   }
 }
 

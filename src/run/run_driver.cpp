@@ -241,6 +241,7 @@ void RunDriver::logSetup() {
 void RunDriver::openResults() {
   hasBegun_ = true;
   state_.objectiveValues.resize(config_.objectives.size());
+  results_->setSources(runner_->output().sources());
   results_->open(config_, runner_->output().observedSeries(), *aggregator_, state_.log);
   putEarlierReportAside();
   signalState.resultFileDescriptor = results_->table().descriptor();
@@ -291,6 +292,7 @@ TaskContext RunDriver::taskContext() {
           [this](std::span<const double> values) { return aggregator_->aggregate(values); },
           parameters_->feasibility(),
           [this](std::string_view text) { warn(text); },
+          [this](std::span<const double> variable) { return otherValueTexts(*parameters_, variable); },
           [this](std::span<const int> numbers, std::size_t first, std::size_t count) {
             return results_->simulatedValues()->columns(numbers, first, count);
           }};
@@ -362,7 +364,7 @@ std::optional<RunDriver::Unwritten> RunDriver::closeResults(const Ending& ending
   if (reporter_) reporter_->settle(*aggregator_);
   if (series_) series_->finish(reporter_->best());
   std::vector<std::string> lines{ending.closingLine, "Ended: " + ending.time};
-  if (reporter_) addFindings(*reporter_, *aggregator_, parameters_->searchSpace().names, config_.measures, lines);
+  if (reporter_) addFindings(*reporter_, *aggregator_, *parameters_, config_.measures, lines);
   lines.insert(lines.end(), report.begin(), report.end());
   const EndingSignalsHeld held;
   signalState.resultFileDescriptor = -1;
@@ -398,6 +400,7 @@ void RunDriver::finish(const TaskOutcome& outcome) {
   }
   reportRun();
   state_.log.line("");
+  for (const std::string& line : reporter_->comparisonLines()) state_.log.line(line);
   const int count = reporter_->evaluationCount();
   state_.log.line(count == 1 ? fmt::format("1 model evaluation, {} failed", reporter_->failedCount())
                              : fmt::format("{} model evaluations, {} of them failed", count, reporter_->failedCount()));

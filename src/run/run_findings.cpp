@@ -11,24 +11,27 @@
 
 namespace mirevo {
 
-void addFindings(const RunReporter& reporter, const ObjectiveAggregator& aggregator,
-                 std::span<const std::string> parameterNames, std::span<const OutputMeasure> measures,
-                 std::vector<std::string>& lines) {
+void addFindings(const RunReporter& reporter, const ObjectiveAggregator& aggregator, ParameterModel& parameters,
+                 std::span<const OutputMeasure> measures, std::vector<std::string>& lines) {
   if (reporter.best()) {
     const std::vector<std::string> scales = aggregator.scaleLines();
     lines.insert(lines.end(), scales.begin(), scales.end());
     const BestEvaluation& best = *reporter.best();
     lines.push_back(fmt::format("Best evaluation: {}", best.number));
     lines.push_back("Best aggregate: " + formatReal(best.aggregate));
-    for (std::size_t i = 0; i < parameterNames.size(); ++i) {
-      lines.push_back(fmt::format("Best {} = {}", parameterNames[i], formatReal(best.parameterValues[i])));
+    const std::vector<std::string>& names = parameters.searchSpace().names;
+    for (std::size_t i = 0; i < names.size(); ++i) {
+      lines.push_back(fmt::format("Best {} = {}", names[i], formatReal(best.parameterValues[i])));
     }
+    for (const std::string& text : otherValueTexts(parameters, best.parameterValues)) lines.push_back("Best " + text);
     for (const OutputMeasure& measure : measures) {
       if (isCriterion(measure))
         lines.push_back(fmt::format("Statistic of {}: {}", measure.name, statisticWithBest(measure)));
     }
     for (const std::string& text : reporter.differencesOfBest()) lines.push_back("Warning: " + text);
   }
+  const std::vector<std::string> compared = reporter.comparisonLines();
+  lines.insert(lines.end(), compared.begin(), compared.end());
   const std::vector<std::string> differences = reporter.differenceLines();
   lines.insert(lines.end(), differences.begin(), differences.end());
 }

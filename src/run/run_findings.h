@@ -6,15 +6,15 @@
 
 #include "measures/objective_functions.h"
 #include "measures/output_measure.h"
+#include "parameters/parameter_model.h"
 #include "run/results/run_record.h"
 #include "run/run_reporter.h"
 
 namespace mirevo {
 
 /// What a run has found by its end: for the last lines of its result file, ...
-void addFindings(const RunReporter& reporter, const ObjectiveAggregator& aggregator,
-                 std::span<const std::string> parameterNames, std::span<const OutputMeasure> measures,
-                 std::vector<std::string>& lines);
+void addFindings(const RunReporter& reporter, const ObjectiveAggregator& aggregator, ParameterModel& parameters,
+                 std::span<const OutputMeasure> measures, std::vector<std::string>& lines);
 /// ... and for its record.
 void addFindings(const RunReporter& reporter, const ObjectiveAggregator& aggregator,
                  std::span<const ObjectiveFunction> objectives, RunRecord& record);

@@ -114,7 +114,9 @@ void RunReporter::evaluationFinished(std::span<const double> set, const Evaluati
   if (!result.ok()) state_.log.line("   " + result.failure->reason);  // follows the message that it failed
   const std::vector<double> values = ToModelScale(space_, set);
   count(values, result, dateAndTimeWithZone());
+  if (const std::string text = valuesText(result); !text.empty()) state_.log.line("   " + text);
   lastWithPairs_ = {result.number, values};
+  if (searchHasEnded_ && result.ok()) finalRun_ = result.number;
   recordSeries(values, result);
   state_.progress.progressStep();
   if (const std::string problem = state_.progress.takeProblem(); !problem.empty()) state_.log.warning(problem);
@@ -134,6 +136,7 @@ void RunReporter::evaluationReplayed(std::span<const double> set, const Evaluati
     replayedWithoutPairs_.insert(result.number);
   } else {
     lastWithPairs_ = {result.number, values};
+    if (searchHasEnded_ && result.ok()) finalRun_ = result.number;
   }
   count(values, result, {});
   if (!result.shownSeries.empty()) {
@@ -231,9 +234,30 @@ std::vector<std::string> RunReporter::differencesOfBest() const {
   return sentencesOnBest(number, ofBest);
 }
 
+std::vector<std::string> RunReporter::comparisonLines() const {
+  if (pairs_ == nullptr || firstSuccess_ == 0) return {};
+  const std::set<int> kept = numbersWithPairs();  // more are there until the end, which ones depends on the machine
+  int number = firstSuccess_;
+  std::string whose = fmt::format("the first successful run, No. {},", number);
+  if (best() && (kept.contains(best()->number) || finalRun_)) {
+    number = kept.contains(best()->number) ? best()->number : *finalRun_;
+    whose = fmt::format("the best evaluation, No. {},", best()->number);
+  }
+  const auto found = pairs_->pairs().find(number);
+  if (found == pairs_->pairs().end()) return {};
+  std::vector<std::string> lines{fmt::format("What {} is judged by:", whose)};
+  for (const MeasurePairs& pairs : found->second) {
+    if (pairs.measure >= sources_.size() || !sources_[pairs.measure].isSeries) continue;
+    lines.push_back("   " + comparisonText(sources_[pairs.measure], pairs));
+  }
+  if (lines.size() == 1) lines.clear();
+  return lines;
+}
+
 std::set<int> RunReporter::numbersWithPairs() const {
   if (firstSuccess_ == 0) return {};
   std::set<int> numbers = others_;
+  if (finalRun_) numbers.insert(*finalRun_);
   numbers.insert(firstSuccess_);
   for (const auto& [key, difference] : differences_) numbers.insert(difference.number);
   return numbers;
@@ -260,12 +284,33 @@ void RunReporter::recordSeries(const std::vector<double>& values, const Evaluati
   if (recorder_ != nullptr) recorder_->evaluationFinished(result, values, best());
 }
 
+std::string RunReporter::valuesText(const EvaluationResult& result) const {
+  constexpr std::size_t kMostMeasures = 3;  // so that the line stays short
+  if (!result.ok()) return {};
+  std::string text;
+  const auto add = [&text](std::string_view what, double value) {
+    text += fmt::format("{}{} {:.6g}", text.empty() ? "" : ", ", what, value);
+  };
+  const std::size_t measures = std::min(sources_.size(), result.measureValues.size());
+  for (std::size_t i = 0; i < measures && measures <= kMostMeasures; ++i) {
+    add(sources_[i].name, result.measureValues[i]);
+  }
+  if (result.objectiveValues.empty() || std::isnan(result.aggregate)) return text;
+  add("aggregate", result.aggregate);
+  if (best()) {
+    add("best so far", best()->aggregate);
+    text += fmt::format(" (No. {})", best()->number);
+  }
+  return text;
+}
+
 void RunReporter::requireLogWritten() const {
   if (state_.log.writeError().empty()) return;
   fatalError("Error: Unable to write to " + state_.log.path(), state_.log.writeError());
 }
 
 void RunReporter::takeBestOf(const SearchSummary& search) {
+  searchHasEnded_ = true;
   if (search.best.empty() || !search.bestResult.ok()) return;
   best_.takeOfSearch({search.bestResult.number, search.bestResult.aggregate, ToModelScale(space_, search.best)});
 }

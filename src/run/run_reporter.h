@@ -78,8 +78,11 @@ class RunReporter final : public EvaluationObserver {
   std::optional<std::string> processesLeftWarning() const;
   /// Names the output files that several model runs have not left, and how many; empty if there are none.
   std::string absentWarning() const;
-  /// The first successful run and the evaluations that differ or have other pairs; empty as long as it is not known
-  /// which is the first successful one.
+  /// For people, by what the best evaluation is judged, one line per measure that compares series, below a heading; by
+  /// what the first successful run is, if that is not known or no evaluation is the best. Empty without such measures.
+  std::vector<std::string> comparisonLines() const;
+  /// The first successful run, the final run of the best set, and the evaluations that differ or have other pairs;
+  /// empty as long as it is not known which is the first successful one.
   std::set<int> numbersWithPairs() const;
 
   int evaluationCount() const { return evaluationCount_; }
@@ -101,6 +104,8 @@ class RunReporter final : public EvaluationObserver {
   void considerAsBest(int number, double aggregate, const std::vector<double>& parameterValues,
                       std::string_view foundAt);
   void requireLogWritten() const;
+  /// The values of a successful evaluation and the best so far, in one line; empty without any.
+  std::string valuesText(const EvaluationResult& result) const;
   /// What is said of each evaluation that differs in this, of all its measures.
   std::map<int, std::string> differencesOfKind(RunDifference::Kind kind) const;
 
@@ -130,6 +135,8 @@ class RunReporter final : public EvaluationObserver {
     int number = 0;
     std::vector<double> parameterValues;  ///< model scale
   } lastWithPairs_;
+  bool searchHasEnded_ = false;
+  std::optional<int> finalRun_;          ///< of a search: repeats the best set
   std::set<int> others_;                 ///< evaluations without such a difference, with pairs of other observations
   std::size_t differencesWarnedOf_ = 0;  ///< one by one
   int runsWithProcessesLeft_ = 0;

@@ -29,7 +29,9 @@ TEST(Report, StandsBesideTheResultsHoweverARunEnds) {
        {R"("state":"finished","message":"Optimisation terminated: Maximum number of)",
         R"("evaluations":31,"planned":31)", R"({"name":"b","kind":"variable")", R"("start":1,"best":)",
         R"("series":[{"measure":"flow")", R"("step":86400000)", R"("initial":[4,)",
-        R"("figures":{"initial":{"n":365,"nse":)", R"("initialNumber":1,"initialLabel":"initial parameters")"}},
+        R"("figures":{"initial":{"n":365,"nse":)", R"("initialNumber":1,"initialLabel":"initial parameters")",
+        R"([{"measure":"flow","evaluation":31,"simulatedItem":"simulated.csv, item No. 1 (simul)",
+        R"("simulatedFirst":[3.736166477,)"}},
       {{.option = 0, .scenarios = {"5, 2, 1", "1, 2, 1"}, .modelArguments = "--fail-above 4.5"},
        1,
        {R"("state":"failed","message":"Error: Unable to continue. No of failed)", R"("failed":1)",
@@ -165,7 +167,8 @@ TEST(Report, OfResultsOfAnEarlierVersion) {
                            HasSubstr("results alone: basin_Run.dat: it is not there.")));
   for (const auto& [from, to] : {std::pair{"\"started\":", ",\"reportMade\""},
                                  {"\"state\"", "\"notes\""},
-                                 {"\"parameters\"", "\"failures\""},
+                                 {"\"parameters\"", "\"comparisons\""},
+                                 {"\"pairs\":365,", "\"failures\""},
                                  {"\"evaluations\":{", nullptr}}) {
     const auto part = [from = from, to = to](const std::string& text) {
       const auto begin = text.find(from);

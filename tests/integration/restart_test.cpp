@@ -189,9 +189,11 @@ TEST_F(Restart, RunsAreComparedWithTheFirstSuccessfulOneThatWasMadeBefore) {
       EXPECT_EQ(occurrences(log(), "\nWarning: " + bestIsPoor + "\n"), named);
       EXPECT_EQ(occurrences(program.error, bestIsPoor), named) << program.error;
       EXPECT_EQ(occurrences(folder_.read("basin_Report.html"), "No. 6, is judged by fewer"), named);
-      EXPECT_THAT(log(),
-                  HasSubstr("\n   flow: 365 pairs, 0 observations without a simulated value, 2001-01-01 00:00 to "
-                            "2001-12-31 00:00\n      observed "));
+      EXPECT_THAT(
+          log(),
+          HasSubstr("\n   flow: simulated.csv, item No. 1 (simulated), 2001-01-01 00:00 to 2001-12-31 00:00 with "
+                    "observed.csv, item No. 1 (simulated), 2001-01-01 00:00 to 2001-12-31 00:00: 365 pairs, 0 "
+                    "observations without a simulated value, 2001-01-01 00:00 to 2001-12-31 00:00; observed "));
     }
     removeResults();
   }

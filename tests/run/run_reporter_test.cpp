@@ -225,7 +225,9 @@ TEST_F(RunReporterTest, AnEvaluationReachesResultFileLogProgressAndTheFileOfFail
   finish(1, 2.5);
   finish(2, kFailedRunValue);
   EXPECT_THAT(folder_.read("s.dat"), HasSubstr("1\tOK\t1\t2.5\t2.5\n2\tFAILED\t1\t1e+30\t1e+30\n"));
-  EXPECT_EQ(folder_.read("s.log"), "Evaluation of parameter set No. 1 initiated\n   run.sh exited with code 3\n");
+  EXPECT_EQ(folder_.read("s.log"),
+            "Evaluation of parameter set No. 1 initiated\n   aggregate 2.5, best so far 2.5 (No. 1)\n   run.sh exited "
+            "with code 3\n");
   EXPECT_THAT(folder_.read("s._spi_"), HasSubstr("MESSAGEvaluation of parameter set No. 1 initiated\n"));
   EXPECT_THAT(folder_.read("s._spi_"), HasSubstr("PROGRE50.0\n"));
   EXPECT_THAT(folder_.read("calSimErr.dat"),

@@ -77,7 +77,7 @@ struct Layout<MeasurePairs> {
 template <>
 struct Layout<FileForm> {
   static void of(auto& archive, auto& file) {
-    archive(file.endsLine, file.numberCount, file.stepCount, file.gapStart, file.gapEnd);
+    archive(file.endsLine, file.numberCount, file.stepCount, file.firstStep, file.lastStep, file.gapStart, file.gapEnd);
   }
 };
 template <>

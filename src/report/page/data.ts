@@ -56,6 +56,20 @@ export interface Objective {
   best: Maybe;
 }
 
+/** What a measure compares; least, mean and largest value of its pairs. */
+export interface Comparison {
+  measure: string;
+  evaluation: number; // whose pairs these are
+  simulatedItem: string;
+  observedItem: string;
+  pairs: number;
+  missing: number; // observations without a simulated value
+  span: [number, number];
+  observed: Maybe[];
+  simulated: Maybe[];
+  simulatedFirst?: Maybe[]; // of the first successful run, if the others are of the best
+}
+
 export interface Failure {
   reason: string;
   count: number;
@@ -156,6 +170,7 @@ export interface ReportData {
   parameters: Parameter[];
   measures: Measure[];
   objectives: Objective[];
+  comparisons: Comparison[];
   best: { number: number; aggregate: Maybe } | null;
   initialNumber: number | null;
   initialLabel?: string | null;
@@ -182,6 +197,7 @@ export function readReportData(text: string): ReportData {
     parameters: list(data.parameters),
     measures: list(data.measures),
     objectives: list(data.objectives),
+    comparisons: list(data.comparisons),
     best: data.best ?? null,
     initialNumber: data.initialNumber ?? null,
     failures: list(data.failures),

@@ -3,6 +3,7 @@ import { drawInTime, drawnOptions } from './chart';
 import { readReportData, type ReportData } from './data';
 import { make } from './dom';
 import { switchTheme } from './look';
+import { comparisonSection } from './sections/comparisons';
 import { failureSection, head, parameterSection, resultSection, runSection, summarySection } from './sections/overview';
 import { dottySection, goodSetsSection, progressSection } from './sections/search';
 import type { Section } from './sections/section';
@@ -19,6 +20,7 @@ function sections(data: ReportData): Section[] {
     seriesSection(data),
     parameterSection(data),
     resultSection(data),
+    comparisonSection(data),
     sampled ? progressSection(data) : null,
     task === 'uncertainty' ? distributionSection(data) : null,
     sampled ? dottySection(data, task === 'uncertainty' ? 'Parameters against objectives' : 'Dotty plots') : null,

@@ -18,10 +18,19 @@ namespace {
 
 const std::vector<std::string>& columns() {
   static const std::vector<std::string> kColumns{
-      "Evaluation",    "Measure",      "Pairs",           "Missing",        "First",         "Last",
-      "LeastObserved", "MeanObserved", "LargestObserved", "LeastSimulated", "MeanSimulated", "LargestSimulated",
-      "LineEnd",       "Numbers",      "Steps",           "GapStart",       "GapEnd"};
+      "Evaluation",    "Measure",          "Pairs",        "Missing",         "First",
+      "Last",          "LeastObserved",    "MeanObserved", "LargestObserved", "LeastSimulated",
+      "MeanSimulated", "LargestSimulated", "LineEnd",      "Numbers",         "Steps",
+      "GapStart",      "GapEnd",           "FirstStep",    "LastStep"};
   return kColumns;
+}
+
+/// Tables of earlier versions have no last two columns.
+bool areColumns(std::span<const std::string> found) {
+  constexpr std::size_t kColumnsOfEarlier = 17;
+  const std::vector<std::string>& all = columns();
+  return found.size() >= kColumnsOfEarlier && found.size() <= all.size() &&
+         std::equal(found.begin(), found.end(), all.begin());
 }
 
 std::string timeCell(std::int64_t second, bool isKnown) {
@@ -32,6 +41,7 @@ std::string rowsOf(int number, std::span<const MeasurePairs> pairs) {
   std::string text;
   for (const MeasurePairs& of : pairs) {
     const bool hasPairs = of.count > 0;
+    const bool hasSteps = of.file.firstStep != 0 || of.file.lastStep != 0;
     const bool hasGap = of.file.gapEnd > of.file.gapStart;
     const auto valueCell = [hasPairs](double value) { return hasPairs ? value : std::nan(""); };
     text += dataTableRow({std::int64_t{number}, static_cast<std::int64_t>(of.measure) + 1,
@@ -41,7 +51,8 @@ std::string rowsOf(int number, std::span<const MeasurePairs> pairs) {
                           valueCell(of.simulated.mean), valueCell(of.simulated.largest),
                           std::int64_t{of.file.endsLine ? 1 : 0}, static_cast<std::int64_t>(of.file.numberCount),
                           static_cast<std::int64_t>(of.file.stepCount), timeCell(of.file.gapStart, hasGap),
-                          timeCell(of.file.gapEnd, hasGap)});
+                          timeCell(of.file.gapEnd, hasGap), timeCell(of.file.firstStep, hasSteps),
+                          timeCell(of.file.lastStep, hasSteps)});
   }
   return text;
 }
@@ -66,6 +77,13 @@ std::optional<FileForm> formOf(std::span<const std::string> cells) {
   const auto steps = countOf(cells[2], 0);
   if (!ends || *ends > 1 || !numbers || !steps) return std::nullopt;
   FileForm form{.endsLine = *ends == 1, .numberCount = *numbers, .stepCount = *steps};
+  if (cells.size() > 6 && !cells[5].empty()) {
+    const auto first = readIsoTime(cells[5]);
+    const auto last = readIsoTime(cells[6]);
+    if (!first || !last || *last < *first) return std::nullopt;
+    form.firstStep = *first;
+    form.lastStep = *last;
+  }
   if (cells[3].empty() && cells[4].empty()) return form;
   const auto start = readIsoTime(cells[3]);
   const auto end = readIsoTime(cells[4]);
@@ -79,7 +97,7 @@ std::optional<MeasurePairs> pairsOf(std::span<const std::string> cells) {
   const auto measure = countOf(cells[1], 1);
   const auto count = countOf(cells[2], 0);
   const auto missing = countOf(cells[3], 0);
-  const auto form = formOf(cells.subspan(12, 5));
+  const auto form = formOf(cells.subspan(12));
   if (!measure || !count || !missing || !form) return std::nullopt;
   MeasurePairs pairs;
   pairs.measure = *measure - 1;
@@ -111,7 +129,7 @@ EarlierPairs readPairs(std::string_view text) {
   const ReadTable table = readDataTable(text);
   const std::size_t lines = lineCount(text);
   read.lostRows = lines - std::min<std::size_t>(lines, 1);
-  if (table.columns != columns()) return read;
+  if (!areColumns(table.columns)) return read;
   for (const std::vector<std::string>& cells : table.rows) {
     const auto number = parseInteger(cells[0]);
     const auto found = pairsOf(cells);

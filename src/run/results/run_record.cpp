@@ -27,6 +27,8 @@ constexpr std::string_view kStarted = "started";
 constexpr std::string_view kRestarted = "restarted";  ///< a row each time
 constexpr std::string_view kPlanned = "plannedEvaluations";
 constexpr std::string_view kSeed = "seed";
+constexpr std::string_view kSimulated = "simulated.";  ///< with the number of the measure behind it
+constexpr std::string_view kObserved = "observed.";
 constexpr std::string_view kWarnings = "warnings";
 constexpr std::string_view kWarning = "warning";  ///< a row each
 constexpr std::string_view kInitial = "initialEvaluation";
@@ -66,6 +68,10 @@ std::optional<std::string> nameBehind(std::string_view front, std::string_view k
   return std::string(key.substr(front.size()));
 }
 
+int numberIn(std::string_view text) {
+  return parseInteger(text).value_or(0);
+}
+
 RunRecord::Scale& scaleOf(RunRecord& record, std::string objective) {
   for (RunRecord::Scale& scale : record.scales) {
     if (scale.objective == objective) return scale;
@@ -89,6 +95,8 @@ void takeRow(const std::string& name, const std::string& value, RunRecord& recor
   if (name == key::kRestarted) record.restarted.push_back(value);
   if (name == key::kPlanned) record.plannedEvaluations = number().value_or(0);
   if (name == key::kSeed) record.seed = number();
+  if (auto measure = nameBehind(key::kSimulated, name)) record.compared[numberIn(*measure)].simulated = value;
+  if (auto measure = nameBehind(key::kObserved, name)) record.compared[numberIn(*measure)].observed = value;
   if (name == key::kWarnings) record.warningCount = number().value_or(0);
   if (name == key::kWarning) record.warnings.push_back(value);
   if (name == key::kInitial) record.initialEvaluation = number();
@@ -125,6 +133,10 @@ std::string runRecordText(const RunRecord& record, const std::vector<std::string
   for (const std::string& time : record.restarted) rows.addText(key::kRestarted, time);
   if (record.plannedEvaluations > 0) rows.addCount(key::kPlanned, record.plannedEvaluations);
   if (record.seed) rows.addCount(key::kSeed, *record.seed);
+  for (const auto& [measure, compared] : record.compared) {
+    rows.addText(joined(key::kSimulated, std::to_string(measure)), compared.simulated);
+    rows.addText(joined(key::kObserved, std::to_string(measure)), compared.observed);
+  }
   if (record.warningCount > 0) rows.addCount(key::kWarnings, record.warningCount);
   for (const std::string& text : record.warnings) rows.addText(key::kWarning, text);
   if (record.stage) {

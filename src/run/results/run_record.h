@@ -1,5 +1,6 @@
 #pragma once
 
+#include <map>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -27,6 +28,13 @@ struct RunRecord {
   std::vector<std::string> restarted;  ///< each time
   int plannedEvaluations = 0;          ///< 0: unknown
   std::optional<int> seed;             ///< where the task draws random numbers
+
+  /// What a measure compares, see MeasureSource.
+  struct Compared {
+    std::string simulated;
+    std::string observed;
+  };
+  std::map<int, Compared> compared;  ///< by the number of the measure
 
   int warningCount = 0;
   std::vector<std::string> warnings;  ///< the first of them

@@ -38,18 +38,6 @@ std::vector<std::string> tableHeadLines(const RunConfig& config) {
   return {columnName(config.title), fmt::format("Mirevo {}", programVersion()), "Setup file: " + config.setupFile};
 }
 
-/// What is known of a run when it begins.
-RunRecord recordOf(const RunConfig& config, const RunLog& log) {
-  RunRecord record;
-  record.warningCount = log.warningCount();
-  record.warnings = log.warnings();
-  if (config.task) record.task = config.task->facts().name.name;
-  record.program = programVersion();
-  record.plannedEvaluations = config.plannedModelRuns();
-  if (config.drawsRandomNumbers()) record.seed = config.task->randomSeed;
-  return record;
-}
-
 const ResultFileNames& namesOf(const RunConfig& config) {
   return config.task ? config.task->facts().resultFiles : run_files::kPlain;
 }
@@ -220,6 +208,25 @@ void RunResults::startAfresh(const RunConfig& config, RunLog& log) {
   record.started = dateAndTimeNow();
   record_.begin(record);
   table_.open(files_.results, headLines(config, record), columns_);
+}
+
+void RunResults::setSources(std::span<const MeasureSource> sources) {
+  for (std::size_t i = 0; i < sources.size(); ++i) {
+    if (sources[i].isSeries) compared_[static_cast<int>(i) + 1] = {sources[i].simulated, sources[i].observed};
+  }
+}
+
+/// What is known of a run when it begins.
+RunRecord RunResults::recordOf(const RunConfig& config, const RunLog& log) const {
+  RunRecord record;
+  record.warningCount = log.warningCount();
+  record.warnings = log.warnings();
+  record.compared = compared_;
+  if (config.task) record.task = config.task->facts().name.name;
+  record.program = programVersion();
+  record.plannedEvaluations = config.plannedModelRuns();
+  if (config.drawsRandomNumbers()) record.seed = config.task->randomSeed;
+  return record;
 }
 
 void RunResults::removeStatistics(const RunConfig& config) const {

@@ -9,6 +9,7 @@
 #include "common/data_table.h"
 #include "common/file_lock.h"
 #include "evaluation/earlier_evaluations.h"
+#include "evaluation/run_comparison.h"
 #include "measures/objective_functions.h"
 #include "measures/observed_series.h"
 #include "parameters/search_space.h"
@@ -34,6 +35,9 @@ class RunResults final {
 
   /// DDS: the searches that this run goes on from.
   std::vector<EarlierSearch> earlierSearches() const;
+
+  /// `sources`: of all measures, for the account of the run.
+  void setSources(std::span<const MeasureSource> sources);
 
   /// Opens the files. Results that the run does not go on from are kept under numbered names. `observed`: the series
   /// whose simulated values are to be kept; empty where the task does not work with them. Says in the log what was
@@ -63,6 +67,7 @@ class RunResults final {
   EarlierEvaluations* earlierEvaluations() { return earlierEvaluations_ ? &*earlierEvaluations_ : nullptr; }
 
  private:
+  RunRecord recordOf(const RunConfig& config, const RunLog& log) const;
   void lockFailedRuns(RunLog& log);
   void warnOfLostRows(RunLog& log) const;
   void startAfresh(const RunConfig& config, RunLog& log);
@@ -92,6 +97,7 @@ class RunResults final {
   PairsFile pairs_;
   UnkeptFiles unkeptFiles_;
   RunRecordFile record_;
+  std::map<int, RunRecord::Compared> compared_;
   std::optional<SimulatedValuesFile> simulatedValues_;
   std::optional<EarlierEvaluations> earlierEvaluations_;
 };

@@ -123,7 +123,12 @@ void logCriteria(const TaskContext& context, const EvaluationResult& result) {
 void logBestSet(const TaskContext& context, const ParameterSet& best, const EvaluationResult& result) {
   std::vector<std::string> objectives;
   for (const ObjectiveFunction& objective : context.objectives) objectives.push_back(objective.name);
-  logValues(context.log, "Best parameter set:", context.space.names, ToModelScale(context.space, best));
+  const std::vector<double> values = ToModelScale(context.space, best);
+  logValues(context.log, "Best parameter set:", context.space.names, values);
+  const std::vector<std::string> others =
+      context.otherParameters ? context.otherParameters(values) : std::vector<std::string>();
+  if (!others.empty()) context.log.line("With it:");
+  for (const std::string& text : others) context.log.line("   " + text);
   logCriteria(context, result);
   logValues(context.log, "Objective functions:", objectives, result.objectiveValues);
   context.log.line(fmt::format("Aggregate: {}", formatReal(result.aggregate)));

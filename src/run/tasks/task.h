@@ -68,6 +68,9 @@ struct TaskContext {
   Feasibility feasibility = {};  ///< which sets can be run, of a model with constraints or equations
   /// Shows the user a warning that the log receives as well. May be empty.
   std::function<void(std::string_view)> warnUser = {};
+  /// The parameters that are not variable, for values of the variable ones on the model scale, "K = 3 (fixed)". May be
+  /// empty.
+  std::function<std::vector<std::string>(std::span<const double> variable)> otherParameters = {};
   /// SimulatedValuesFile::columns(), if the task readsSimulatedValues().
   std::function<std::vector<double>(std::span<const int> numbers, std::size_t first, std::size_t count)>
       simulatedColumns = {};
