@@ -98,7 +98,7 @@ std::optional<std::int64_t> OutputReader::observationLeftOut(std::size_t measure
   if (end % kSecondsOfDay != 0) return std::nullopt;
   rest.end = dateOfSecond(end + kSecondsOfDay - 1);
   const PeriodSeries series =
-      readPeriodSeries(series_.observation(measure), description_.measures[measure].observation, rest);
+      readPeriodObservations(series_.observation(measure), description_.measures[measure], rest);
   for (std::size_t i = 0; i < series.seconds.size(); ++i) {
     const bool isOfDay = series.seconds[i] > end && series.seconds[i] < end + kSecondsOfDay;
     if (isOfDay && !std::isnan(series.values[i])) return series.seconds[i];
@@ -110,7 +110,7 @@ std::vector<PeriodSeries> OutputReader::readShownObservations() {
   std::vector<PeriodSeries> observations;
   for (const std::size_t i : shownMeasures_) {
     observations.push_back(
-        readPeriodSeries(series_.observation(i), description_.measures[i].observation, description_.period));
+        readPeriodObservations(series_.observation(i), description_.measures[i], description_.period));
   }
   return observations;
 }

@@ -18,33 +18,67 @@ double ratio(double numerator, double denominator) {
   return std::isfinite(value) ? value : kNaN;
 }
 
-double sumOf(std::span<const double> values) {
-  return std::accumulate(values.begin(), values.end(), 0.0);
+/// As how many values the one at this place counts.
+double countAt(std::span<const double> weights, std::size_t place) {
+  return weights.empty() ? 1.0 : weights[place] * weights[place];
+}
+
+/// As how many pairs all of them count.
+double countOf(ValuePairs pairs) {
+  if (pairs.weights.empty()) return static_cast<double>(pairs.observed.size());
+  return std::inner_product(pairs.weights.begin(), pairs.weights.end(), pairs.weights.begin(), 0.0);
+}
+
+double sumOf(std::span<const double> values, std::span<const double> weights) {
+  double sum = 0.0;
+  for (std::size_t i = 0; i < values.size(); ++i) sum += countAt(weights, i) * values[i];
+  return sum;
 }
 
 /// The sum of what `term` makes of each pair.
 template <class Term>
 double sumOver(ValuePairs pairs, const Term& term) {
   double sum = 0.0;
-  for (std::size_t i = 0; i < pairs.observed.size(); ++i) sum += term(pairs.simulated[i], pairs.observed[i]);
+  for (std::size_t i = 0; i < pairs.observed.size(); ++i) {
+    sum += countAt(pairs.weights, i) * term(pairs.simulated[i], pairs.observed[i]);
+  }
   return sum;
 }
 
 /// The sum of the squared deviations from the mean: exactly 0 for values that are all the same, whose mean may be
 /// rounded.
-double squaredDeviations(std::span<const double> values) {
+double squaredDeviations(std::span<const double> values, std::span<const double> weights) {
   if (std::adjacent_find(values.begin(), values.end(), std::not_equal_to<>()) == values.end()) return 0.0;
-  const double mean = meanOf(values);
-  return std::accumulate(values.begin(), values.end(), 0.0,
-                         [mean](double sum, double value) { return sum + (value - mean) * (value - mean); });
+  const double mean = meanOf(values, weights);
+  double sum = 0.0;
+  for (std::size_t i = 0; i < values.size(); ++i) {
+    sum += countAt(weights, i) * ((values[i] - mean) * (values[i] - mean));
+  }
+  return sum;
+}
+
+double simulatedMean(ValuePairs pairs) {
+  return meanOf(pairs.simulated, pairs.weights);
+}
+
+double observedMean(ValuePairs pairs) {
+  return meanOf(pairs.observed, pairs.weights);
+}
+
+double simulatedDeviations(ValuePairs pairs) {
+  return squaredDeviations(pairs.simulated, pairs.weights);
+}
+
+double observedDeviations(ValuePairs pairs) {
+  return squaredDeviations(pairs.observed, pairs.weights);
 }
 
 double pearson(ValuePairs pairs) {
-  const double simulatedMean = meanOf(pairs.simulated);
-  const double observedMean = meanOf(pairs.observed);
-  const double products = sumOver(pairs, [&](double s, double o) { return (s - simulatedMean) * (o - observedMean); });
+  const double ofSimulated = simulatedMean(pairs);
+  const double ofObserved = observedMean(pairs);
+  const double products = sumOver(pairs, [&](double s, double o) { return (s - ofSimulated) * (o - ofObserved); });
   // The root of the product: exactly 1 for two equal series.
-  const double r = ratio(products, std::sqrt(squaredDeviations(pairs.simulated) * squaredDeviations(pairs.observed)));
+  const double r = ratio(products, std::sqrt(simulatedDeviations(pairs) * observedDeviations(pairs)));
   return std::clamp(r, -1.0, 1.0);
 }
 
@@ -109,20 +143,19 @@ double highVolume(std::span<const double> values) {
 
 }  // namespace
 
-double meanOf(std::span<const double> values) {
-  return sumOf(values) / static_cast<double>(values.size());
+double meanOf(std::span<const double> values, std::span<const double> weights) {
+  return sumOf(values, weights) / countOf({values, values, weights});
 }
 
 double nashSutcliffe(ValuePairs pairs) {
-  return 1.0 - ratio(sumOfSquaredErrors(pairs), squaredDeviations(pairs.observed));
+  return 1.0 - ratio(sumOfSquaredErrors(pairs), observedDeviations(pairs));
 }
 
 KlingGupta klingGupta(ValuePairs pairs) {
   KlingGupta found;
   found.correlation = pearson(pairs);
-  found.variability =
-      ratio(std::sqrt(squaredDeviations(pairs.simulated)), std::sqrt(squaredDeviations(pairs.observed)));
-  found.meanRatio = ratio(meanOf(pairs.simulated), meanOf(pairs.observed));
+  found.variability = ratio(std::sqrt(simulatedDeviations(pairs)), std::sqrt(observedDeviations(pairs)));
+  found.meanRatio = ratio(simulatedMean(pairs), observedMean(pairs));
   found.variationRatio = ratio(found.variability, found.meanRatio);
   const auto efficiency = [&](double spread) {
     return 1.0 - std::hypot(found.correlation - 1.0, spread - 1.0, found.meanRatio - 1.0);
@@ -133,35 +166,34 @@ KlingGupta klingGupta(ValuePairs pairs) {
 }
 
 double klingGuptaNonParametric(ValuePairs pairs) {
-  const double simulatedMean = meanOf(pairs.simulated);
-  const double observedMean = meanOf(pairs.observed);
+  const double ofSimulated = meanOf(pairs.simulated);
+  const double ofObserved = meanOf(pairs.observed);
   const std::vector<double> simulatedCurve = inDescendingOrder(pairs.simulated);
   const std::vector<double> observedCurve = inDescendingOrder(pairs.observed);
   const double distance = sumOver({simulatedCurve, observedCurve}, [&](double s, double o) {
-    return std::abs(ratio(s, simulatedMean) - ratio(o, observedMean));
+    return std::abs(ratio(s, ofSimulated) - ratio(o, ofObserved));
   });
   const double alikeness = 1.0 - 0.5 * distance / static_cast<double>(pairs.observed.size());
   const std::vector<double> simulatedRanks = ranksOf(pairs.simulated);
   const std::vector<double> observedRanks = ranksOf(pairs.observed);
   const double spearman = pearson({simulatedRanks, observedRanks});
-  return 1.0 - std::hypot(spearman - 1.0, alikeness - 1.0, ratio(simulatedMean, observedMean) - 1.0);
+  return 1.0 - std::hypot(spearman - 1.0, alikeness - 1.0, ratio(ofSimulated, ofObserved) - 1.0);
 }
 
 double percentBias(ValuePairs pairs) {
-  return percent(sumOf(pairs.simulated), sumOf(pairs.observed));
+  return percent(sumOf(pairs.simulated, pairs.weights), sumOf(pairs.observed, pairs.weights));
 }
 
 double meanAbsoluteError(ValuePairs pairs) {
-  return ratio(sumOver(pairs, [](double s, double o) { return std::abs(s - o); }),
-               static_cast<double>(pairs.observed.size()));
+  return ratio(sumOver(pairs, [](double s, double o) { return std::abs(s - o); }), countOf(pairs));
 }
 
 double rootMeanSquareError(ValuePairs pairs) {
-  return std::sqrt(ratio(sumOfSquaredErrors(pairs), static_cast<double>(pairs.observed.size())));
+  return std::sqrt(ratio(sumOfSquaredErrors(pairs), countOf(pairs)));
 }
 
 double standardisedRootMeanSquareError(ValuePairs pairs) {
-  return std::sqrt(ratio(sumOfSquaredErrors(pairs), squaredDeviations(pairs.observed)));
+  return std::sqrt(ratio(sumOfSquaredErrors(pairs), observedDeviations(pairs)));
 }
 
 double sumOfSquaredErrors(ValuePairs pairs) {
@@ -170,7 +202,7 @@ double sumOfSquaredErrors(ValuePairs pairs) {
 }
 
 double indexOfAgreement(ValuePairs pairs) {
-  const double mean = meanOf(pairs.observed);
+  const double mean = observedMean(pairs);
   const double largest = sumOver(pairs, [mean](double s, double o) {
     const double reach = std::abs(s - mean) + std::abs(o - mean);
     return reach * reach;

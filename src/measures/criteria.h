@@ -11,10 +11,15 @@ namespace mirevo {
 struct ValuePairs {
   std::span<const double> simulated;
   std::span<const double> observed;
+  /// Of the differences, n or none. A pair of weight w counts as w*w pairs, in means as in sums and moments, so that a
+  /// sum of squared errors is that of the weighted ones (Hill and Tiedeman 2007, Effective Groundwater Model
+  /// Calibration, Wiley); without weights each pair counts once. Ranks, extremes, volumes and duration curves
+  /// do not use them.
+  std::span<const double> weights = {};
 };
 
-/// Mean of a series; NaN if it is empty.
-double meanOf(std::span<const double> values);
+/// Mean of a series; NaN if it is empty. `weights` as of ValuePairs.
+double meanOf(std::span<const double> values, std::span<const double> weights = {});
 
 /// Nash and Sutcliffe (1970), doi:10.1016/0022-1694(70)90255-6: 1 - sum of squared errors over that of the deviations
 /// of the observations from their mean. Undefined if the observations do not vary.

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <limits>
 #include <span>
 #include <string>
 
@@ -47,6 +48,7 @@ struct SeriesItem {
   DateRecord start;
   std::optional<float> deleteValue;
   std::optional<std::span<const double>> exact;  ///< its values in 64 bits; none where those in 32 bits are used
+  std::vector<double> weights = {};              ///< one per step, 0 for a value that does not count; empty: each 1
 
   std::optional<double> valueAtTime(double time, std::size_t& hint, double largestGap) const {
     if (exact) return exactValueAt(series.times(), *exact, time, hint, largestGap);
@@ -72,6 +74,14 @@ SeriesItem readItem(TimeSeriesObject& series, const SeriesReference& reference, 
   }
   SeriesItem item{series, reference.itemNo, name, *start, deleteValue, std::nullopt};
   if (precision == SeriesPrecision::exact) item.exact = series.exactValues(reference.itemNo);
+  return item;
+}
+
+/// The item of a measure's observations, of which some may not count.
+SeriesItem readObservedItem(TimeSeriesObject& series, const OutputMeasure& measure, const EvaluationPeriod& period,
+                            SeriesPrecision precision) {
+  SeriesItem item = readItem(series, measure.observation, precision);
+  item.weights = observationWeights(series, measure, period);
   return item;
 }
 
@@ -102,8 +112,8 @@ std::string describeLackOf(const MeasureStatistics& statistics, const SeriesItem
   return describeLackOfObservations(observation.series, observation.item, observation.fileName) + "\n";
 }
 
-/// Calls `use(time, observed, simulated)` for every observation in the period that is not missing, in order, with
-/// its time in days on the simulation's axis and the simulated value there, if there is one; stops when that is false.
+/// Calls `use(time, observed, weight, simulated)` for every observation in the period that counts, in order, with its
+/// time in days on the simulation's axis and the simulated value there, if there is one; stops when that is false.
 template <typename Use>
 void forEachObservation(const SeriesItem& simulation, const SeriesItem& observation, const EvaluationPeriod& period,
                         const Use& use) {
@@ -119,8 +129,10 @@ void forEachObservation(const SeriesItem& simulation, const SeriesItem& observat
     if (time < days.start - kSameTimeDays) continue;
     if (time > days.end + kSameTimeDays) break;
     if (isMissing(observed[k], observation.deleteValue)) continue;
+    const double weight = observation.weights.empty() ? 1.0 : observation.weights[k];
+    if (weight == 0.0) continue;
     const double value = observation.exact ? (*observation.exact)[k] : observed[k];
-    if (!use(time, value, simulation.valueAtTime(time, hint, period.largestGapDays()))) break;
+    if (!use(time, value, weight, simulation.valueAtTime(time, hint, period.largestGapDays()))) break;
   }
 }
 
@@ -134,13 +146,14 @@ MeasureStatistics collectPairs(const SeriesItem& simulation, const SeriesItem& o
   std::optional<double> firstUnused;
   double sumOfObserved = 0.0;
   forEachObservation(simulation, observation, period,
-                     [&](double time, double observed, const std::optional<double>& simulated) {
+                     [&](double time, double observed, double weight, const std::optional<double>& simulated) {
                        ++statistics.observationCount;
                        sumOfObserved += observed;
                        if (simulated) {
                          statistics.times.push_back(time);
                          statistics.simulatedValues.push_back(*simulated);
                          statistics.observedValues.push_back(observed);
+                         if (!observation.weights.empty()) statistics.weights.push_back(weight);
                        } else if (!firstUnused) {
                          firstUnused = time;
                        }
@@ -166,7 +179,8 @@ void addDifferenceStatistics(const Weights<Number>& weights, MeasureStatistics& 
   Number sumOfSquares = 0;
   const ValuePairs pairs = comparedPairs(statistics);
   for (std::size_t i = 0; i < pairs.simulated.size(); ++i) {
-    const Number e = weights.difference(pairs.simulated[i], pairs.observed[i]);
+    Number e = weights.difference(pairs.simulated[i], pairs.observed[i]);
+    if (!pairs.weights.empty()) e *= static_cast<Number>(pairs.weights[i]);
     sum += e;
     sumOfSquares += e * e;
   }
@@ -178,6 +192,17 @@ void addDifferenceStatistics(const Weights<Number>& weights, MeasureStatistics& 
   statistics.rootMeanSquare = rootMeanSquare;
   // If v is zero, or negative by rounding, the result is v itself: deliberately not clipped.
   statistics.standardDeviation = v > 0 ? std::sqrt(v) : v;
+}
+
+/// The values of observations, NaN for one that does not count; empty if all of them count.
+std::vector<double> countingValues(const SeriesItem& observation) {
+  std::vector<double> values;
+  const std::span<const float> single = observation.series.values(observation.item);
+  for (std::size_t k = 0; k < observation.weights.size(); ++k) {
+    const double value = observation.exact ? (*observation.exact)[k] : single[k];
+    values.push_back(observation.weights[k] == 0.0 ? std::numeric_limits<double>::quiet_NaN() : value);
+  }
+  return values;
 }
 
 /// Peak and low difference over the period, cut to the time span of the simulated series.
@@ -194,10 +219,13 @@ void addPeakStatistics(const SeriesItem& simulation, const SeriesItem& observati
   }
   const double offset = daysSince(observation.start, simulation.start);
   const Period observedCut{cut.start + offset, cut.end + offset};
-  const auto extract = [](const auto& single, const auto& exact, const SeriesItem& item, const Period& span,
-                          std::string_view what) {
+  const std::vector<double> counting = countingValues(observation);
+  const auto extract = [&counting](const auto& single, const auto& exact, const SeriesItem& item, const Period& span,
+                                   std::string_view what) {
     std::optional<double> value;
-    if (item.exact) {
+    if (!item.weights.empty()) {
+      value = exact(item.series.times(), counting, span.start, span.end);
+    } else if (item.exact) {
       value = exact(item.series.times(), *item.exact, span.start, span.end);
     } else {
       value = single(item.series, item.item, span.start, span.end);
@@ -230,8 +258,10 @@ void transformPairs(const OutputMeasure& measure, MeasureStatistics& statistics)
 }  // namespace
 
 ValuePairs comparedPairs(const MeasureStatistics& statistics) {
-  if (statistics.transformed) return {statistics.transformed->simulatedValues, statistics.transformed->observedValues};
-  return {statistics.simulatedValues, statistics.observedValues};
+  if (statistics.transformed) {
+    return {statistics.transformed->simulatedValues, statistics.transformed->observedValues, statistics.weights};
+  }
+  return {statistics.simulatedValues, statistics.observedValues, statistics.weights};
 }
 
 void requireItem(TimeSeriesObject& series, const SeriesReference& reference) {
@@ -249,7 +279,7 @@ MeasureStatistics computeMeasureStatistics(const OutputMeasure& measure, const E
                                            TimeSeriesObject& simulation, TimeSeriesObject& observation, double weight,
                                            double weightAbove, bool wantPeaks, SeriesPrecision precision) {
   const SeriesItem simulated = readItem(simulation, measure.simulation, precision);
-  const SeriesItem observed = readItem(observation, measure.observation, precision);
+  const SeriesItem observed = readObservedItem(observation, measure, period, precision);
   MeasureStatistics statistics = collectPairs(simulated, observed, period);
   transformPairs(measure, statistics);
   const auto add = [&](const auto& weights) {
@@ -275,8 +305,8 @@ bool hasPairs(const OutputMeasure& measure, const EvaluationPeriod& period, Time
               TimeSeriesObject& observation) {
   bool found = false;
   forEachObservation(readItem(simulation, measure.simulation, SeriesPrecision::single),
-                     readItem(observation, measure.observation, SeriesPrecision::single), period,
-                     [&found](double, double, const std::optional<double>& simulated) {
+                     readObservedItem(observation, measure, period, SeriesPrecision::single), period,
+                     [&found](double, double, double, const std::optional<double>& simulated) {
                        found = simulated.has_value();
                        return !found;
                      });
@@ -292,6 +322,7 @@ double valueAgainst(const ObservedSeries& observed, std::span<const double> simu
   statistics.times = observed.days;
   statistics.simulatedValues.assign(simulated.begin(), simulated.end());
   statistics.observedValues = observed.values;
+  statistics.weights = observed.weights;
   statistics.observationCount = observed.values.size();
   statistics.epsilon = kShareOfMean * std::abs(meanOf(observed.values));
   transformPairs(measure, statistics);

@@ -31,6 +31,7 @@ struct MeasureStatistics {
   std::vector<double> times;            ///< of the pairs, in days since the start of the simulated series
   std::vector<double> simulatedValues;  ///< one per pair
   std::vector<double> observedValues;   ///< one per pair
+  std::vector<double> weights;          ///< of the observations, one per pair; empty: each 1
   /// The pairs as the statistics compare them, if that is not as they are.
   std::optional<TransformedPairs> transformed;
   double epsilon = 0.0;                   ///< the small value that is added where a logarithm or inverse is taken
@@ -46,9 +47,10 @@ ValuePairs comparedPairs(const MeasureStatistics& statistics);
 void requireItem(TimeSeriesObject& series, const SeriesReference& reference);
 
 /// Statistics of the weighted differences simulated minus observed: `weight` times a difference that is not positive,
-/// `weightAbove` times one that is. The period includes both ends. Missing observations, and those without a simulated
-/// value at their time, do not count. The peak and low differences are computed only if `wantPeaks`. The two files may
-/// start at different times; equal times always match. Throws FatalError with the fixed texts.
+/// `weightAbove` times one that is, times the weight of the observation. The period includes both ends. Missing
+/// observations, those of weight 0, and those without a simulated value at their time do not count. The peak and low
+/// differences are computed only if `wantPeaks`. The two files may start at different times; equal times always match.
+/// Throws FatalError with the fixed texts.
 MeasureStatistics computeMeasureStatistics(const OutputMeasure& measure, const EvaluationPeriod& period,
                                            TimeSeriesObject& simulation, TimeSeriesObject& observation, double weight,
                                            double weightAbove, bool wantPeaks,

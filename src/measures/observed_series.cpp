@@ -25,9 +25,12 @@ ObservedSeries readObservedSeries(std::size_t index, const OutputMeasure& measur
   const std::span<const float> values = observation.values(measure.observation.itemNo);
   std::span<const double> exact;
   if (precision == SeriesPrecision::exact) exact = observation.exactValues(measure.observation.itemNo);
+  const std::vector<double> weights = observationWeights(observation, measure, period);
   for (std::size_t k = 0; k < times.size(); ++k) {
     if (times[k] < first || times[k] > last || isMissing(values[k], observation.deleteValue())) continue;
+    if (!weights.empty() && weights[k] == 0.0) continue;
     observed.days.push_back(times[k]);
+    if (!weights.empty()) observed.weights.push_back(weights[k]);
     observed.values.push_back(precision == SeriesPrecision::exact ? exact[k] : values[k]);
   }
   return observed;

@@ -10,13 +10,14 @@
 
 namespace mirevo {
 
-/// The observations of one output measure: those in the evaluation period that are not missing. They are the same for
+/// The observations of one output measure: those in the evaluation period that count. They are the same for
 /// all evaluations of a run, so that simulated values at their times can be compared between evaluations.
 struct ObservedSeries {
-  std::size_t measure = 0;     ///< 0-based index of the output measure
-  DateRecord start{};          ///< origin of `days`
-  std::vector<double> days;    ///< ascending
-  std::vector<double> values;  ///< one per time
+  std::size_t measure = 0;           ///< 0-based index of the output measure
+  DateRecord start{};                ///< origin of `days`
+  std::vector<double> days;          ///< ascending
+  std::vector<double> values;        ///< one per time
+  std::vector<double> weights = {};  ///< one per time; empty: each 1
 };
 
 /// The period includes both ends. Throws FatalError if the item cannot be read.

@@ -7,6 +7,7 @@
 
 #include "common/date_record.h"
 #include "common/settings/code_name.h"
+#include "measures/observation_weights.h"
 #include "platform/series/time_series_object.h"
 
 namespace mirevo {
@@ -61,6 +62,7 @@ struct OutputMeasure {
   std::string functionName;    ///< the objective function that it belongs to; empty: none
   SeriesReference simulation;  ///< in or below the base folder
   SeriesReference observation;
+  ObservationWeighting weighting;  ///< of the observations
 };
 
 /// Values of series in 32 bits, as the statistics of a run use them, or with all digits of their file.

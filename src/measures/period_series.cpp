@@ -9,9 +9,12 @@
 #include "measures/measure_statistics.h"
 
 namespace mirevo {
+namespace {
 
-PeriodSeries readPeriodSeries(TimeSeriesObject& series, const SeriesReference& reference,
-                              const EvaluationPeriod& period) {
+/// `weights`: one per step, 0 for one that is taken as missing; empty: each 1.
+
+PeriodSeries readSteps(TimeSeriesObject& series, const SeriesReference& reference, const EvaluationPeriod& period,
+                       std::span<const double> weights) {
   requireItem(series, reference);
   PeriodSeries read;
   const std::optional<DateRecord> start = series.startTime();
@@ -30,11 +33,25 @@ PeriodSeries readPeriodSeries(TimeSeriesObject& series, const SeriesReference& r
   for (auto time = first; time != last; ++time) {
     const std::int64_t second = secondAfter(origin, *time);
     if (!read.seconds.empty() && second <= read.seconds.back()) continue;  // a step of less than a second
-    const float value = values[static_cast<std::size_t>(time - times.begin())];
+    const auto step = static_cast<std::size_t>(time - times.begin());
+    const float value = values[step];
+    const bool isLeftOut = !weights.empty() && weights[step] == 0.0;
     read.seconds.push_back(second);
-    read.values.push_back(isMissing(value, deleteValue) ? std::numeric_limits<float>::quiet_NaN() : value);
+    read.values.push_back(isLeftOut || isMissing(value, deleteValue) ? std::numeric_limits<float>::quiet_NaN() : value);
   }
   return read;
+}
+
+}  // namespace
+
+PeriodSeries readPeriodSeries(TimeSeriesObject& series, const SeriesReference& reference,
+                              const EvaluationPeriod& period) {
+  return readSteps(series, reference, period, {});
+}
+
+PeriodSeries readPeriodObservations(TimeSeriesObject& series, const OutputMeasure& measure,
+                                    const EvaluationPeriod& period) {
+  return readSteps(series, measure.observation, period, stepWeights(series, measure));
 }
 
 std::vector<float> valuesAt(const PeriodSeries& series, std::span<const std::int64_t> seconds, double largestGap) {
@@ -57,11 +74,15 @@ std::vector<float> valuesAt(const PeriodSeries& series, std::span<const std::int
   return values;
 }
 
-bool isSamePair(const OutputMeasure& a, const OutputMeasure& b) {
+bool isSameItems(const OutputMeasure& a, const OutputMeasure& b) {
   const auto isSame = [](const SeriesReference& left, const SeriesReference& right) {
     return left.fileName == right.fileName && left.itemNo == right.itemNo;
   };
   return isSame(a.simulation, b.simulation) && isSame(a.observation, b.observation);
+}
+
+bool isSamePair(const OutputMeasure& a, const OutputMeasure& b) {
+  return isSameItems(a, b) && a.weighting == b.weighting;
 }
 
 std::vector<std::size_t> measuresOfDistinctPairs(std::span<const OutputMeasure> measures) {

@@ -24,13 +24,19 @@ struct PeriodSeries {
 PeriodSeries readPeriodSeries(TimeSeriesObject& series, const SeriesReference& reference,
                               const EvaluationPeriod& period);
 
+/// The same of a measure's observations, those that do not count being missing.
+PeriodSeries readPeriodObservations(TimeSeriesObject& series, const OutputMeasure& measure,
+                                    const EvaluationPeriod& period);
+
 /// The values at the given times (ascending): that of a step at the time, else interpolated linearly between its two
 /// neighbours as for the output measures; NaN outside the time axis, next to a missing value, and between two steps
 /// that are farther apart than `largestGap` (days).
 std::vector<float> valuesAt(const PeriodSeries& series, std::span<const std::int64_t> seconds,
                             double largestGap = kAnyGap);
 
-/// Whether two measures compare the same two series.
+/// Whether two measures compare the same items of the same files.
+bool isSameItems(const OutputMeasure& a, const OutputMeasure& b);
+/// Whether two measures compare the same two series, with the same weights.
 bool isSamePair(const OutputMeasure& a, const OutputMeasure& b);
 
 /// The measures that compare series, 0-based; of several that compare the same pair only the first.

@@ -126,7 +126,9 @@ SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> mea
       observationLocations.push_back(measure.observation.fileLocation);
     }
     observationItems.resize(tables.observationNames_.size());
-    observationItems[tables.observationIndex_.back()].push_back(measure.observation.itemNo);
+    std::vector<int>& items = observationItems[tables.observationIndex_.back()];
+    items.push_back(measure.observation.itemNo);
+    for (const int item : measure.weighting.items()) items.push_back(item);
     tables.simulationIndex_.push_back(indexOf(tables.simulationNames_, measure.simulation.fileName));
     if (tables.simulationNames_.size() > simulationLocations.size()) {
       simulationLocations.push_back(measure.simulation.fileLocation);
@@ -166,11 +168,15 @@ void SeriesTables::checkItems(std::span<const OutputMeasure> measures, const Eva
     requireItem(observation(i), measures[i].observation);
     const ObservedSeries observed = readObservedSeries(i, measures[i], period, SeriesPrecision::single, observation(i));
     if (isForRuns) {
+      requireCounting(observation(i), measures[i], period);
       requireObservations(observed, measures[i], period);
       requireDefined(observed, measures[i]);
     }
     comparedItems_[i].observed = itemText(observation(i), measures[i].observation) + spanText(observation(i));
     warnOfMarkers(observed, measures[i]);
+    for (const std::string& doubt : doubtsOfCodes(observation(i), measures[i], period)) {
+      addWarning(measures[i].weighting.qualityLocation, doubt);
+    }
     warnOfDefaultItem(observation(i), measures[i].observation, observationNames_[observationIndex_[i]]);
     // Files in the base folder that have no time steps yet tell nothing about their columns.
     if (simulation(i).timeStepCount() < 1) {

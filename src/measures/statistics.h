@@ -17,7 +17,7 @@ enum class Best { zero, smallest, largest };  // a criterion's largest value is 
 
 /// One way to reduce the comparison of two series to a number. A new one is a row of the table and a function of the
 /// pairs, computed in double precision. Those with a code are statistics of the weighted differences; the others judge
-/// the pairs without weights.
+/// the pairs without the weights of the measure.
 struct Statistic {
   CodeName key;                               ///< in setups; one without a code has a name only
   std::string_view description;               ///< in the log and the report, with its unit if it has one of its own
@@ -27,7 +27,8 @@ struct Statistic {
   /// worse one; MeasureTerm multiplies it by the weight of the measure. Values of statistics with a code are used
   /// unchanged, including negative differences: the type of the objective function decides on the sign.
   double (*inObjective)(double value);
-  bool needsPeaks = false;  ///< it uses the peak or low difference of MeasureStatistics
+  bool takesWeights = false;  ///< observations may have weights other than 0 and 1, unless values become ranks
+  bool needsPeaks = false;    ///< it uses the peak or low difference of MeasureStatistics
   /// Of the values before the statistic; of one that has none the setup may choose it.
   ValueTransformation transformation = ValueTransformation::none;
   bool isOfSizes = false;           ///< ranks would make it the same for any simulation, or nearly so
@@ -47,6 +48,8 @@ bool isCriterion(const OutputMeasure& measure);
 double bestValue(const OutputMeasure& measure);
 /// The transformation that the values of a measure undergo: the statistic's own or the setup's.
 ValueTransformation transformationOf(const OutputMeasure& measure);
+/// Whether its observations may have weights other than 0 and 1.
+bool takesWeights(const OutputMeasure& measure);
 /// For people: the statistic and its transformation.
 std::string describeStatistic(const OutputMeasure& measure);
 /// To be put behind the value of a measure that is NaN: when its statistic is, ", as it is if ..."; empty if that is

@@ -6,6 +6,7 @@
 #include <gtest/gtest.h>
 
 #include "common/data_table.h"
+#include "common/text.h"
 #include "integration/model_folder.h"
 #include "integration/mpi_job.h"
 #include "matchers.h"
@@ -73,6 +74,25 @@ TEST(LocalSensitivity, OfALinearModelGivesTheCovarianceOfItsClosedForm) {
               -(1.0 + s / 365.0) / rmse, 1e-4);
   EXPECT_THAT(results, ::testing::ContainsRegex("#.*1\\. a"));
   EXPECT_THAT(folder.read("basin.log"), HasSubstr("\nParameter covariance: 365 observations, 2 parameters, 363 "));
+}
+
+TEST(LocalSensitivity, WeighsEachObservationByItsOwnError) {
+  const ModelFolder folder;
+  const std::string before = folder.read("observed.csv");
+  std::string observed;
+  for (const std::string_view line : splitLines(before)) {
+    const char* more = line.starts_with("2001-01") ? ",0,9" : ",0.5,0";
+    observed += fmt::format("{}{}\n", line, observed.empty() ? ",error,code" : more);
+  }
+  folder.write("observed.csv", observed);
+  const std::string setup = folder.writeSetup({.option = 1});
+  folder.editSetup("'observed.csv'", "'observed.csv'\nError_Item_No = 2\nQuality_Item_No = 3\nQuality_Left_Out = 9");
+  const ProgramResult run = runProgram({setup});
+  ASSERT_EQ(run.exitCode, 0) << run.error;
+  const ReadTable jacobian = readDataTable(folder.read("basin_Jacobian.dat"));
+  ASSERT_EQ(jacobian.rows.size(), 334U);
+  EXPECT_EQ(jacobian.rows[0][1], "2001-02-01T00:00:00");
+  EXPECT_EQ(jacobian.rows[0][2], "4");
 }
 
 // Interpolated values have all digits, however coarse those that the model prints.

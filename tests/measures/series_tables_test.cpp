@@ -84,6 +84,44 @@ TEST_F(SeriesTablesTest, ObservationsOfWhichACriterionIsUndefinedEndTheRunBefore
               ElementsAre(HasSubstr("cannot be computed where all of its observations are compared")));
 }
 
+TEST_F(SeriesTablesTest, WeightsThatCannotBeMeantEndTheRunOrAreWarnedOf) {
+  folder_.write("weighed.csv",
+                "# missing = -9\ntime,Q,E,C\n2000-12-31,4,0,7\n2001-01-01,4,2,1\n2001-01-02,-9,0,2\n"
+                "2001-01-03,6,-1,3\n2001-01-04,6,-9,4\n");
+  const std::tuple<ObservationWeighting, std::string, std::string> cases[] = {
+      {{.errorItem = 2},
+       "Error: Invalid weight of an observation for output measure Flow",
+       "s.kdx:7:9: Error_Item_No: " + folder_ / "weighed.csv" + ": item No. 2 (E) is -1 at 2001-01-03 00:00, where"},
+      {{.errorItem = 2, .qualityItem = 3, .leftOut = {3}},
+       "Error: Invalid weight",
+       "(E) is missing at 2001-01-04 00:00"},
+      {{.weightItem = 2}, "Error: Invalid weight", "expected a weight of 0 or more"},
+      {{.weightItem = 4}, "Error: Item No. 4 not found in " + folder_ / "weighed.csv", "the file has 3 items"},
+      {{.qualityItem = 3, .leftOut = {1, 3, 4}},
+       "Error: No observation counts for output measure Flow",
+       "each of 3 values of item No. 1 (Q) in the evaluation period has a code of Quality_Left_Out (1, 3, 4)"},
+      {{.qualityItem = 3, .leftOut = {2, 7}},
+       "",
+       "has a code of Quality_Left_Out (2, 7); there are 1 (1 time), 3 (1 time), 4 (1 time)"},
+      {{.errorItem = 2, .qualityItem = 3, .leftOut = {3, 4}}, "", ""},
+  };
+  for (const auto& [weighting, message, detail] : cases) {
+    OutputMeasure flow = measure("sim.csv", "weighed.csv");
+    flow.name = "Flow";
+    flow.weighting = weighting;
+    flow.weighting.weightLocation = "s.kdx:7:9: Error_Item_No: ";
+    std::vector<std::string> warnings;
+    const std::string refusal =
+        refusalOf([&] { warnings = SeriesTables::MirevoTSobjectInit(std::vector{flow}, kPeriod).warnings(); });
+    EXPECT_THAT(refusal, StartsWith(message.empty() ? "accepted" : message));
+    if (detail.empty()) {
+      EXPECT_THAT(warnings, ElementsAre());
+    } else {
+      EXPECT_THAT(message.empty() ? warnings.at(0) : refusal, HasSubstr(detail));
+    }
+  }
+}
+
 TEST_F(SeriesTablesTest, SetupFailuresEndTheRun) {
   folder_.write("bad.csv", "time,Q\n2001-01-01,1,2\n");
   folder_.write("text.csv", "time,Q\n2001-01-01,bad\n");

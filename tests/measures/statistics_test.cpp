@@ -131,6 +131,50 @@ TEST(Statistics, CompareTransformedValues) {
                   std::sqrt(5.0F / 4.0F));
 }
 
+/// The value for daily observations with a second item.
+double valueWith(OutputMeasure measure, const std::vector<float>& simulated, const std::vector<float>& observed,
+                 const std::vector<float>& second, const ObservationWeighting& weighting) {
+  std::vector<double> days(simulated.size());
+  std::iota(days.begin(), days.end(), 0.0);
+  const EvaluationPeriod period{{2001, 1, 1}, {2001, 1, 31}};
+  MemoryTimeSeries simulation(period.start, days, {simulated}, kNothing);
+  MemoryTimeSeries observation(period.start, days, {observed, second}, kNothing);
+  measure.weighting = weighting;
+  return measureValue(measure, period, simulation, observation);
+}
+
+TEST(Statistics, AnObservationOfWeightTwoCountsAsFour) {
+  const std::vector<float> simulated{3, 2.5, 6, 9.25, 1};
+  const std::vector<float> observed{2.75, 2, 7.5, 8, 1.25};
+  const ObservationWeighting weights{.weightItem = 2};
+  const ObservationWeighting errors{.errorItem = 2};
+  for (std::size_t i = 0; i < statisticTable().size(); ++i) {
+    const Statistic& statistic = statisticTable()[i];
+    SCOPED_TRACE(statistic.key.name);
+    const OutputMeasure measure{.statisticType = static_cast<StatisticType>(i), .epsilon = 0.1};
+    const double without =
+        selectStatistic(compare(measure, simulated, {2.75, 2, 7.5, kNothing, 1.25}), measure.statisticType);
+    EXPECT_THAT(valueWith(measure, simulated, observed, {0, 1, kNothing, 9, 0}, {.qualityItem = 2, .leftOut = {8, 9}}),
+                ::testing::NanSensitiveDoubleEq(without));
+    if (!takesWeights(measure)) continue;
+    EXPECT_EQ(valueWith(measure, simulated, observed, {1, 1, 1, 0, 1}, weights), without);
+    if (statistic.key.code) continue;
+    const double repeated = selectStatistic(
+        compare(measure, {3, 2.5, 2.5, 2.5, 2.5, 6, 1}, {2.75, 2, 2, 2, 2, 7.5, 1.25}), measure.statisticType);
+    EXPECT_NEAR(valueWith(measure, simulated, observed, {1, 2, 1, kNothing, 1}, weights), repeated, 1e-12);
+    if (statistic.key.name == "sum of squared errors") continue;  // four times as large
+    EXPECT_NEAR(valueWith(measure, simulated, {2.75, 2, 7.5, kNothing, 1.25}, {1, 0.5, 1, 0, 1}, errors), repeated,
+                1e-12);
+    EXPECT_NEAR(valueWith(measure, simulated, observed, {0, 1, 0, 9, 0},
+                          {.qualityItem = 2, .leftOut = {9}, .downWeighted = {0}}),
+                repeated, 1e-12);
+  }
+  // Differences 0.25, 0.5, -1.5, -0.25.
+  const auto rms = static_cast<float>(valueWith({.statisticType = StatisticType::rootMeanSquare}, simulated,
+                                                {2.75, 2, 7.5, kNothing, 1.25}, {1, 2, 1, 1, 1}, weights));
+  EXPECT_FLOAT_EQ(rms, std::sqrt(3.375F / 4.0F));
+}
+
 TEST(Statistics, AreFoundByNameInAnyLetterCase) {
   EXPECT_EQ(findStatistic("Root MEAN square"), StatisticType::rootMeanSquare);
   EXPECT_EQ(findStatistic("root mean"), std::nullopt);

@@ -2,6 +2,8 @@
 
 #include <map>
 #include <tuple>
+#include <utility>
+#include <vector>
 
 #include <fmt/format.h>
 
@@ -12,15 +14,25 @@
 namespace mirevo {
 namespace {
 
-SettingSection<SeriesReference> seriesSection(std::string_view path, std::string_view meaning,
-                                              std::string_view fileMeaning) {
-  return {{path,
-           "for each measure of interface type 0",
-           meaning,
-           {setting<&SeriesReference::fileName>(
-                {.name = "File_Name", .type = KeywordType::fileName, .meaning = std::string(fileMeaning)}),
-            setting<&SeriesReference::itemNo>(
-                {.name = "Item_No", .defaultValue = "1", .meaning = "Which item of the file, from 1."})}}};
+/// The keywords of the series that `seriesOf(measure)` returns.
+template <class SeriesOf>
+std::vector<KeywordRow> seriesKeywords(SeriesOf, std::string_view fileMeaning) {
+  using Measure = OutputMeasure;
+  return {setting<Measure>([](auto& m) -> auto& { return SeriesOf{}(m).fileName; },
+                           {.name = "File_Name", .type = KeywordType::fileName, .meaning = std::string(fileMeaning)}),
+          setting<Measure>([](auto& m) -> auto& { return SeriesOf{}(m).itemNo; },
+                           {.name = "Item_No", .defaultValue = "1", .meaning = "Which item of the file, from 1."})};
+}
+
+/// Which other item of the observation file is meant: `itemOf(weighting)`.
+template <class ItemOf>
+KeywordRow weightingItem(ItemOf, std::string_view name, std::string_view meaning) {
+  return setting<OutputMeasure>([](auto& m) -> auto& { return ItemOf{}(m.weighting); },
+                                {.name = name,
+                                 .defaultValue = kNoDefault,
+                                 .range = from(1),
+                                 .refusal = "Error: Item number invalid for output measure ",
+                                 .meaning = std::string(meaning)});
 }
 
 }  // namespace
@@ -294,17 +306,55 @@ const SettingSection<OutputMeasure>& measureSection() {
   return section;
 }
 
-const SettingSection<SeriesReference>& simulationFileSection() {
-  static const SettingSection<SeriesReference> section =
-      seriesSection("ObjectiveFunctions/OUTPUT_MEASURES/MEASURE_n/SIMULATION_FILE", "The simulated series.",
-                    "The simulated time-series file, in or below the base folder.");
+const SettingSection<OutputMeasure>& simulationFileSection() {
+  static const SettingSection<OutputMeasure> section{
+      {"ObjectiveFunctions/OUTPUT_MEASURES/MEASURE_n/SIMULATION_FILE", "for each measure of interface type 0",
+       "The simulated series.",
+       seriesKeywords(
+           [](auto& m) -> auto& { return m.simulation; },
+           "The simulated time-series file, in or below the base folder.")}};
   return section;
 }
 
-const SettingSection<SeriesReference>& observationFileSection() {
-  static const SettingSection<SeriesReference> section =
-      seriesSection("ObjectiveFunctions/OUTPUT_MEASURES/MEASURE_n/OBSERVATION_FILE", "The observed series.",
-                    "The observed time-series file.");
+const SettingSection<OutputMeasure>& observationFileSection() {
+  using Measure = OutputMeasure;
+  static const SettingSection<OutputMeasure> section = [] {
+    std::vector<KeywordRow> keywords = seriesKeywords(
+        [](auto& m) -> auto& { return m.observation; }, "The observed time-series file.");
+    keywords.push_back(weightingItem(
+        [](auto& w) -> auto& { return w.weightItem; }, "Weight_Item_No",
+        "Item of the file with a weight for each observation, which multiplies its "
+        "difference. One with the weight 0 or a missing one does not count."));
+    keywords.push_back(weightingItem(
+        [](auto& w) -> auto& { return w.errorItem; }, "Error_Item_No",
+        "Item with a standard error for each observation: its weight is 1 over that. Not "
+        "with `Weight_Item_No`."));
+    keywords.push_back(weightingItem(
+        [](auto& w) -> auto& { return w.qualityItem; }, "Quality_Item_No",
+        "Item with a quality code, a number, for each observation; those without one count in full."));
+    keywords.push_back(setting<Measure>([](auto& m) -> auto& { return m.weighting.leftOut; },
+                                        {.name = "Quality_Left_Out",
+                                         .defaultValue = kNoDefault,
+                                         .meaning = "Codes of observations that do not count."}));
+    keywords.push_back(setting<Measure>([](auto& m) -> auto& { return m.weighting.downWeighted; },
+                                        {.name = "Quality_Down_Weighted",
+                                         .defaultValue = kNoDefault,
+                                         .meaning = "Codes of observations whose weight is multiplied by "
+                                                    "`Quality_Weight`."}));
+    keywords.push_back(checked<Measure>(
+        setting<Measure>([](auto& m) -> auto& { return m.weighting.qualityWeight; },
+                         {.name = "Quality_Weight",
+                          .defaultValue = "0.5",
+                          .range = kPositive,
+                          .refusal = "Error: Weight invalid for output measure ",
+                          .meaning = "The factor of these, greater than 0 and less than 1. Differences are multiplied "
+                                     "by it, squares by its square."}),
+        [](const Measure& measure) { return validateWeighting(measure); }));
+    return SettingSection<OutputMeasure>{{"ObjectiveFunctions/OUTPUT_MEASURES/MEASURE_n/OBSERVATION_FILE",
+                                          "for each measure of interface type 0", "The observed series.",
+                                          std::move(keywords),
+                                          itemName<Measure>([](const Measure& measure) { return measure.name; })}};
+  }();
   return section;
 }
 

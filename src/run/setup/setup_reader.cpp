@@ -90,8 +90,7 @@ class SetupReader final {
   void readModelParameters();
   void readInternalConstraints();
   void readObjectiveFunctions();
-  static void readReference(const SetupSection& section, const SettingSection<SeriesReference>& keywords,
-                            SeriesReference& reference);
+  static void locateReference(const SetupSection& section, SeriesReference& reference);
   void readSeries(const SetupSection& section, OutputMeasure& measure) const;
   void connectMeasures();
   void readSavedFiles();
@@ -258,9 +257,7 @@ void SetupReader::readObjectiveFunctions() {
 
 /// Files of series are opened when the whole setup has been read; what is wrong with them is then told with its
 /// location.
-void SetupReader::readReference(const SetupSection& section, const SettingSection<SeriesReference>& keywords,
-                                SeriesReference& reference) {
-  section.read(keywords, reference);
+void SetupReader::locateReference(const SetupSection& section, SeriesReference& reference) {
   reference.fileLocation = section.location("File_Name") + ": File_Name: ";
   reference.itemLocation = section.location("Item_No") + ": Item_No: ";
   reference.isDefaultItem = !section.isWritten("Item_No");
@@ -274,7 +271,8 @@ void SetupReader::readSeries(const SetupSection& section, OutputMeasure& measure
     return needsSeries ? std::optional(section.open(name)) : section.openIfPresent(name);
   };
   if (const auto simulated = open("SIMULATION_FILE")) {
-    readReference(*simulated, simulationFileSection(), measure.simulation);
+    simulated->read(simulationFileSection(), measure);
+    locateReference(*simulated, measure.simulation);
     if (measure.simulation.fileName.empty() && needsSeries) {
       simulated->refuse(withNumber("Error: No output file defined for output measure No. %", number), "File_Name",
                         "expected the name of a file");
@@ -284,7 +282,17 @@ void SetupReader::readSeries(const SetupSection& section, OutputMeasure& measure
     }
   }
   if (const auto observed = open("OBSERVATION_FILE")) {
-    readReference(*observed, observationFileSection(), measure.observation);
+    observed->read(observationFileSection(), measure);
+    locateReference(*observed, measure.observation);
+    const auto locationOf = [&observed](std::string_view keyword) {
+      return fmt::format("{}: {}: ", observed->location(keyword), keyword);
+    };
+    measure.weighting.weightLocation =
+        locationOf(measure.weighting.errorItem != 0 ? "Error_Item_No" : "Weight_Item_No");
+    measure.weighting.qualityLocation = locationOf("Quality_Item_No");
+    if (observed->isWritten("Quality_Weight") && measure.weighting.downWeighted.empty()) {
+      observed->warn("Quality_Weight", "has no effect without Quality_Down_Weighted");
+    }
     if (measure.observation.fileName.empty() && needsSeries) {
       observed->refuse(withNumber("Error: No observation file defined for output measure No. %", number), "File_Name",
                        "expected the name of a file");

@@ -52,8 +52,8 @@ class Summary final {
     line("Evaluation period: {} to {}", formatDate(config_.period.start), formatDate(config_.period.end));
     line("Output measures: {}", config_.measures.size());
     for (const OutputMeasure& measure : config_.measures) {
-      line("  {}: {}, {}, objective function {}", measure.name, statisticWithBest(measure), weightText(measure),
-           measure.functionName.empty() ? "none" : measure.functionName);
+      line("  {}: {}, {}{}, objective function {}", measure.name, statisticWithBest(measure), weightText(measure),
+           describeWeighting(measure.weighting), measure.functionName.empty() ? "none" : measure.functionName);
     }
     line("Objective functions: {}", config_.objectives.size());
     for (const ObjectiveFunction& function : config_.objectives) {

@@ -1,6 +1,9 @@
 #include "run/setup/validation.h"
 
+#include <algorithm>
 #include <cmath>
+#include <string_view>
+#include <utility>
 
 #include <fmt/core.h>
 
@@ -104,6 +107,51 @@ std::optional<SettingRefusal> validateValueTransformation(const OutputMeasure& m
   if (reason.empty()) return std::nullopt;
   return SettingRefusal{"Error: Transformation invalid for output measure " + measure.name, "Transformation",
                         fmt::format("the statistic '{}' {}", statistic.key.name, reason)};
+}
+
+std::optional<SettingRefusal> validateWeighting(const OutputMeasure& measure) {
+  const ObservationWeighting& w = measure.weighting;
+  const auto refuse = [&measure](std::string_view keyword, std::string explanation) {
+    return SettingRefusal{"Error: Weights of observations invalid for output measure " + measure.name, keyword,
+                          std::move(explanation)};
+  };
+  if (w.weightItem != 0 && w.errorItem != 0) {
+    return refuse("Error_Item_No", "expected Weight_Item_No or Error_Item_No, found both");
+  }
+  const std::string_view weightKeyword = w.errorItem != 0 ? "Error_Item_No" : "Weight_Item_No";
+  const bool hasCodes = !w.leftOut.empty() || !w.downWeighted.empty();
+  const std::string_view listKeyword = w.leftOut.empty() ? "Quality_Down_Weighted" : "Quality_Left_Out";
+  if (hasCodes && w.qualityItem == 0) {
+    return refuse(listKeyword, "expected Quality_Item_No beside it, the item of the file that has the codes");
+  }
+  if (!hasCodes && w.qualityItem != 0) {
+    return refuse("Quality_Item_No",
+                  "expected Quality_Left_Out or Quality_Down_Weighted beside it, the codes that "
+                  "make a difference");
+  }
+  for (const auto& [keyword, item] : {std::pair{weightKeyword, std::max(w.weightItem, w.errorItem)},
+                                      std::pair{std::string_view("Quality_Item_No"), w.qualityItem}}) {
+    if (item != measure.observation.itemNo) continue;
+    return refuse(keyword, fmt::format("expected another item than the observed one, Item_No = {}", item));
+  }
+  const auto isInBoth = [&w](double code) { return std::ranges::find(w.leftOut, code) != w.leftOut.end(); };
+  if (const auto both = std::ranges::find_if(w.downWeighted, isInBoth); both != w.downWeighted.end()) {
+    return refuse("Quality_Down_Weighted",
+                  fmt::format("expected a code in one list, found {} in Quality_Left_Out, too", formatReal(*both)));
+  }
+  if (!(w.qualityWeight < 1.0)) {
+    return refuse("Quality_Weight",
+                  fmt::format("expected a number between 0 and 1, found {}{}", formatReal(w.qualityWeight),
+                              w.qualityWeight == 1.0 ? ", with which the codes change nothing" : ""));
+  }
+  if (measure.interfaceType != InterfaceType::timeSeries || !w.weighs() || takesWeights(measure)) return std::nullopt;
+  const bool isOfRanks = measure.transformation == ValueTransformation::rank;
+  return refuse(
+      std::max(w.weightItem, w.errorItem) != 0 ? weightKeyword : "Quality_Down_Weighted",
+      fmt::format("{} has no weighted form: use another one, or leave observations out with "
+                  "Quality_Left_Out",
+                  isOfRanks ? std::string("the transformation 'rank'")
+                            : fmt::format("the statistic '{}'", statisticOf(measure.statisticType).key.name)));
 }
 
 std::optional<SettingRefusal> validateObjectiveFunction(const ObjectiveFunction& function, NamesUsed& names) {

@@ -28,6 +28,8 @@ std::optional<SettingRefusal> validateEvaluationPeriod(const EvaluationPeriod& p
 std::optional<SettingRefusal> validateMeasurementNumber(const OutputMeasure& measure);
 /// That the statistic leaves the choice of a transformation to the setup.
 std::optional<SettingRefusal> validateValueTransformation(const OutputMeasure& measure);
+/// Checks the weights and quality codes of observations, and that the statistic can use them.
+std::optional<SettingRefusal> validateWeighting(const OutputMeasure& measure);
 /// Checks that no earlier objective function has the name.
 std::optional<SettingRefusal> validateObjectiveFunction(const ObjectiveFunction& function, NamesUsed& names);
 /// Checks that the scale and location of aggregation methods 1 and 2 are given in the setup or can be determined from

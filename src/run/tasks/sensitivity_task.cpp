@@ -76,13 +76,14 @@ bool hasWeight(const OutputMeasure& measure) {
   return measure.weight != 0.0 || (measure.weightAbove != 0.0 && !isCriterion(measure));
 }
 
-/// Every pair of series that enters an objective function, once, however many measures compare it. The weight of an
-/// observation is the square of the measure's weight for its difference, as in a sum of squares.
+/// Every observation that enters an objective function, once, however many measures compare it. The weight of an
+/// observation is the square of the weight of its difference, as in a sum of squares.
 ComparedValues compareSeries(const TaskContext& context, std::span<const EvaluationResult> results) {
   const std::span<const OutputMeasure> measures = context.measures;
   ComparedValues compared;
   compared.simulated.resize(results.size());
   std::vector<std::size_t> taken;
+  std::vector<const ObservedSeries*> weighed;
   std::size_t first = 0;
   for (const ObservedSeries& series : context.observedSeries) {
     const std::size_t count = series.values.size();
@@ -97,6 +98,12 @@ ComparedValues compareSeries(const TaskContext& context, std::span<const Evaluat
         });
     if (!isInObjective(context, series.measure) || isRepeated || isLeft) continue;
     taken.push_back(series.measure);
+    // Of measures that compare the same items with other weights of the observations, the first has each of these.
+    const auto isWeighed = [&](double days) {
+      return std::ranges::any_of(weighed, [&](const ObservedSeries* other) {
+        return isSameItems(measure, measures[other->measure]) && std::ranges::binary_search(other->days, days);
+      });
+    };
     // The run that shows most digits tells the unit: in another one all values may end with zeros.
     std::vector<double> units(count, std::numeric_limits<double>::quiet_NaN());
     for (std::size_t i = 0; i < results.size(); ++i) {
@@ -110,11 +117,14 @@ ComparedValues compareSeries(const TaskContext& context, std::span<const Evaluat
     const std::int64_t origin = secondNumber(series.start);
     for (std::size_t t = 0; t < count; ++t) {
       const bool isAbove = results.front().ok() && results.front().simulatedValues[begin + t] > series.values[t];
-      const double weight = isAbove && !isCriterion(measure) ? measure.weightAbove : measure.weight;
+      const double own = isAbove && !isCriterion(measure) ? measure.weightAbove : measure.weight;
+      const double ofObservation = series.weights.empty() ? 1.0 : series.weights[t];
+      const double weight = isWeighed(series.days[t]) ? 0.0 : own * ofObservation;
       compared.observed.push_back(weight == 0.0 ? std::numeric_limits<double>::quiet_NaN() : series.values[t]);
       compared.weights.push_back(weight * weight);
       compared.labels.push_back({measure.name, isoTime(secondAfter(origin, series.days[t]))});
     }
+    if (hasWeight(measure)) weighed.push_back(&series);
   }
   return compared;
 }

@@ -63,7 +63,7 @@ TEST(KeywordHelp, EveryKeywordIsFoundByItsNameWithMoreOrLessOfItsSection) {
     const std::string help = keywordHelp(name);
     EXPECT_TRUE(help.starts_with(name + "\n  Meaning: ")) << help;
     EXPECT_EQ(help.find(']'), std::string::npos) << "a link stays: " << help;
-    for (const std::string_view line : splitLines(help)) EXPECT_LE(line.size(), 80U) << line;
+    for (const std::string_view line : splitLines(help)) EXPECT_TRUE(line == name || line.size() <= 80U) << line;
     const std::string inTwo = name.substr(name.find('/') + 1);
     EXPECT_NE(("\n" + keywordHelp(toLowerAscii(inTwo))).find("\n" + name + "\n"), std::string::npos) << inTwo;
   }

@@ -1,0 +1,214 @@
+#include "measures/observation_weights.h"
+
+#include <algorithm>
+#include <cmath>
+#include <cstddef>
+#include <limits>
+#include <map>
+#include <optional>
+#include <span>
+#include <string_view>
+#include <tuple>
+
+#include <fmt/format.h>
+
+#include "common/calendar.h"
+#include "common/fatal_error.h"
+#include "common/text.h"
+#include "measures/dates.h"
+#include "measures/measure_statistics.h"
+#include "measures/output_measure.h"
+#include "platform/series/time_series_object.h"
+
+namespace mirevo {
+namespace {
+
+constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
+
+/// In 32 bits, as a file may hold them: 1.1 is 1.1 in each.
+bool contains(std::span<const double> codes, double code) {
+  return std::ranges::any_of(codes,
+                             [code](double listed) { return static_cast<float>(listed) == static_cast<float>(code); });
+}
+
+/// The values of another item of the file, NaN where one is missing; empty for item 0.
+std::span<const double> itemValues(TimeSeriesObject& observation, const OutputMeasure& measure, std::int32_t item,
+                                   const std::string& location) {
+  if (item == 0) return {};
+  requireItem(observation, {.fileName = measure.observation.fileName, .itemNo = item, .itemLocation = location});
+  return observation.exactValues(item);
+}
+
+double weightOf(const ObservationWeighting& weighting, double value) {
+  if (weighting.errorItem != 0) return value > 0.0 ? 1.0 / value : kNaN;
+  if (std::isnan(value)) return 0.0;
+  return value >= 0.0 ? value : kNaN;
+}
+
+/// Whether the observed item has a value, per step.
+std::vector<bool> observedSteps(TimeSeriesObject& observation, const OutputMeasure& measure) {
+  requireItem(observation, measure.observation);
+  const std::span<const float> values = observation.values(measure.observation.itemNo);
+  const std::optional<float> deleteValue = observation.deleteValue();
+  std::vector<bool> observed;
+  for (const float value : values) observed.push_back(!isMissing(value, deleteValue));
+  return observed;
+}
+
+/// Calls `use(step)` for each step in the period, 0-based.
+template <class Use>
+void forEachStepIn(const EvaluationPeriod& period, const TimeSeriesObject& observation, const Use& use) {
+  const std::optional<DateRecord> start = observation.startTime();
+  if (!start) return;
+  const double first = daysSince(*start, period.start) - kSameTimeDays;
+  const double last = daysSince(*start, period.end) + kSameTimeDays;
+  const std::span<const double> times = observation.times();
+  for (std::size_t k = 0; k < times.size(); ++k) {
+    if (times[k] >= first && times[k] <= last) use(k);
+  }
+}
+
+std::string nameOf(const TimeSeriesObject& observation, std::int32_t item) {
+  return fmt::format("item No. {} ({})", item, observation.itemName(item));
+}
+
+[[noreturn]] void refuseWeight(TimeSeriesObject& observation, const OutputMeasure& measure, std::size_t step) {
+  const ObservationWeighting& weighting = measure.weighting;
+  const bool isError = weighting.errorItem != 0;
+  const std::int32_t item = isError ? weighting.errorItem : weighting.weightItem;
+  const double value = observation.exactValues(item)[step];
+  const std::int64_t second = secondAfter(secondNumber(observation.startTime().value()), observation.times()[step]);
+  fatalError("Error: Invalid weight of an observation for output measure " + measure.name,
+             fmt::format("{}{}: {} is {} at {}, where the observation counts\n{}", weighting.weightLocation,
+                         trimTrailing(measure.observation.fileName), nameOf(observation, item),
+                         std::isnan(value) ? "missing" : formatReal(value), formatDate(dateOfSecond(second)),
+                         isError ? "expected a standard error greater than 0; leave out observations without one by a "
+                                   "quality code, or mark them as missing"
+                                 : "expected a weight of 0 or more; 0, or a missing one, leaves the observation out"));
+}
+
+/// "no observation in the evaluation period has a code of Quality_Left_Out (5); there are 0 (360 times), 1 (5)"
+std::string doubtOfList(std::string_view keyword, std::span<const double> codes,
+                        const std::map<double, std::size_t>& counts) {
+  constexpr std::size_t kMostNamed = 10;
+  const auto isListed = [codes](const auto& count) { return contains(codes, count.first); };
+  if (codes.empty() || std::ranges::any_of(counts, isListed)) return {};
+  std::string present;
+  std::size_t named = 0;
+  for (const auto& [code, count] : counts) {
+    if (++named > kMostNamed) break;
+    present +=
+        fmt::format("{}{} ({})", present.empty() ? "; there are " : ", ", formatReal(code), countText(count, "time"));
+  }
+  if (named > kMostNamed) present += ", ...";
+  return fmt::format("no observation in the evaluation period has a code of {} ({}){}", keyword, fmt::join(codes, ", "),
+                     present);
+}
+
+}  // namespace
+
+std::vector<int> ObservationWeighting::items() const {
+  std::vector<int> found;
+  for (const std::int32_t item : {weightItem, errorItem, qualityItem}) {
+    if (item != 0) found.push_back(item);
+  }
+  return found;
+}
+
+bool ObservationWeighting::operator==(const ObservationWeighting& other) const {
+  const auto meaning = [](const ObservationWeighting& w) {
+    return std::tie(w.weightItem, w.errorItem, w.qualityItem, w.leftOut, w.downWeighted, w.qualityWeight);
+  };
+  return meaning(*this) == meaning(other);
+}
+
+std::vector<double> stepWeights(TimeSeriesObject& observation, const OutputMeasure& measure) {
+  const ObservationWeighting& weighting = measure.weighting;
+  if (!weighting.isUsed()) return {};
+  const std::vector<bool> observed = observedSteps(observation, measure);
+  const std::span<const double> given =
+      itemValues(observation, measure, std::max(weighting.weightItem, weighting.errorItem), weighting.weightLocation);
+  const std::span<const double> codes =
+      itemValues(observation, measure, weighting.qualityItem, weighting.qualityLocation);
+  std::vector<double> weights(observed.size(), 0.0);
+  for (std::size_t k = 0; k < weights.size(); ++k) {
+    if (!observed[k] || (!codes.empty() && contains(weighting.leftOut, codes[k]))) continue;
+    double weight = given.empty() ? 1.0 : weightOf(weighting, given[k]);
+    if (!codes.empty() && contains(weighting.downWeighted, codes[k])) weight *= weighting.qualityWeight;
+    weights[k] = std::isfinite(static_cast<float>(weight)) ? weight : kNaN;  // statistics may use 32 bits
+  }
+  return weights;
+}
+
+std::vector<double> observationWeights(TimeSeriesObject& observation, const OutputMeasure& measure,
+                                       const EvaluationPeriod& period) {
+  std::vector<double> weights = stepWeights(observation, measure);
+  if (weights.empty()) return weights;
+  forEachStepIn(period, observation, [&](std::size_t step) {
+    if (std::isnan(weights[step])) refuseWeight(observation, measure, step);
+  });
+  return weights;
+}
+
+std::vector<std::string> doubtsOfCodes(TimeSeriesObject& observation, const OutputMeasure& measure,
+                                       const EvaluationPeriod& period) {
+  const ObservationWeighting& weighting = measure.weighting;
+  std::vector<std::string> doubts;
+  if (weighting.qualityItem == 0) return doubts;
+  const std::vector<bool> observed = observedSteps(observation, measure);
+  const std::span<const double> codes =
+      itemValues(observation, measure, weighting.qualityItem, weighting.qualityLocation);
+  std::map<double, std::size_t> counts;
+  forEachStepIn(period, observation, [&](std::size_t step) {
+    if (observed[step] && !std::isnan(codes[step])) ++counts[codes[step]];
+  });
+  for (const std::string& doubt : {doubtOfList("Quality_Left_Out", weighting.leftOut, counts),
+                                   doubtOfList("Quality_Down_Weighted", weighting.downWeighted, counts)}) {
+    if (doubt.empty()) continue;
+    doubts.push_back(fmt::format("{}: {}: {}", trimTrailing(measure.observation.fileName),
+                                 nameOf(observation, weighting.qualityItem), doubt));
+  }
+  return doubts;
+}
+
+void requireCounting(TimeSeriesObject& observation, const OutputMeasure& measure, const EvaluationPeriod& period) {
+  const std::vector<double> weights = observationWeights(observation, measure, period);
+  if (weights.empty()) return;
+  const std::vector<bool> observed = observedSteps(observation, measure);
+  std::size_t count = 0;
+  bool anyCounts = false;
+  forEachStepIn(period, observation, [&](std::size_t step) {
+    count += observed[step] ? 1 : 0;
+    anyCounts = anyCounts || weights[step] != 0.0;
+  });
+  if (count == 0 || anyCounts) return;
+  const ObservationWeighting& weighting = measure.weighting;
+  std::string causes;
+  if (!weighting.leftOut.empty()) {
+    causes = fmt::format("a code of Quality_Left_Out ({})", fmt::join(weighting.leftOut, ", "));
+  }
+  if (weighting.weightItem != 0) {
+    causes += fmt::format("{}the weight 0 or none in {}", causes.empty() ? "" : ", or ",
+                          nameOf(observation, weighting.weightItem));
+  }
+  fatalError("Error: No observation counts for output measure " + measure.name,
+             fmt::format("{}{}: each of {} of item No. {} ({}) in the evaluation period has {}\n"
+                         "take codes out of the list, or compare another item or period",
+                         weighting.leftOut.empty() ? weighting.weightLocation : weighting.qualityLocation,
+                         trimTrailing(measure.observation.fileName), countText(count, "value"),
+                         measure.observation.itemNo, observation.itemName(measure.observation.itemNo), causes));
+}
+
+std::string describeWeighting(const ObservationWeighting& weighting) {
+  std::string text;
+  if (weighting.weightItem != 0) text += fmt::format(", weights in item No. {}", weighting.weightItem);
+  if (weighting.errorItem != 0) text += fmt::format(", standard errors in item No. {}", weighting.errorItem);
+  if (weighting.qualityItem != 0) text += fmt::format(", quality codes in item No. {}", weighting.qualityItem);
+  if (!weighting.leftOut.empty()) text += fmt::format(", left out {}", fmt::join(weighting.leftOut, " "));
+  if (!weighting.downWeighted.empty()) {
+    text += fmt::format(", weight {} for {}", weighting.qualityWeight, fmt::join(weighting.downWeighted, " "));
+  }
+  return text;
+}
+
+}  // namespace mirevo
