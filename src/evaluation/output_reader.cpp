@@ -88,15 +88,18 @@ RunComparison OutputReader::runComparison() const {
 
 std::optional<std::int64_t> OutputReader::observationLeftOut(std::size_t measure) {
   constexpr std::int64_t kSecondsOfDay = 86400;
-  EvaluationPeriod rest{description_.period.end, description_.period.end};
+  const OutputMeasure& compared = description_.measures[measure];
+  const DateRecord last = countedPeriod(compared, description_.period).end;
+  EvaluationPeriod rest{last, last};
   const std::int64_t end = secondNumber(rest.start);
   if (end % kSecondsOfDay != 0) return std::nullopt;
   rest.end = dateOfSecond(end + kSecondsOfDay - 1);
-  const PeriodSeries series =
-      readPeriodSeries(series_.observation(measure), description_.measures[measure].observation, rest);
+  const PeriodSeries series = readPeriodSeries(series_.observation(measure), compared.observation, rest);
+  const ObservationFilter filter(compared.selection, last);
   for (std::size_t i = 0; i < series.seconds.size(); ++i) {
     const bool isOfDay = series.seconds[i] > end && series.seconds[i] < end + kSecondsOfDay;
-    if (isOfDay && !std::isnan(series.values[i])) return series.seconds[i];
+    const double days = static_cast<double>(series.seconds[i] - end) / kSecondsPerDay;
+    if (isOfDay && !std::isnan(series.values[i]) && filter.counts(days, series.values[i])) return series.seconds[i];
   }
   return std::nullopt;
 }
@@ -106,6 +109,7 @@ std::vector<PeriodSeries> OutputReader::readShownObservations() {
   for (const std::size_t i : shownMeasures_) {
     observations.push_back(
         readPeriodSeries(series_.observation(i), description_.measures[i].observation, description_.period));
+    keepCounted(observations.back(), description_.measures[i], description_.period);
   }
   return observations;
 }
@@ -148,7 +152,8 @@ EvaluationResult OutputReader::read(const OutputFiles& files) {
 std::vector<PeriodSeries> OutputReader::readShownSeries() {
   std::vector<PeriodSeries> shown;
   for (const std::size_t i : shownMeasures_) {
-    shown.push_back(readPeriodSeries(series_.simulation(i), description_.measures[i].simulation, description_.period));
+    shown.push_back(readMatchedSeries(series_.simulation(i), series_.observation(i), description_.measures[i],
+                                      description_.period));
   }
   return shown;
 }

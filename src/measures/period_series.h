@@ -30,7 +30,7 @@ PeriodSeries readPeriodSeries(TimeSeriesObject& series, const SeriesReference& r
 std::vector<float> valuesAt(const PeriodSeries& series, std::span<const std::int64_t> seconds,
                             double largestGap = kAnyGap);
 
-/// Whether two measures compare the same two series.
+/// Whether two measures compare the same two series, in the same way and with the same observations.
 bool isSamePair(const OutputMeasure& a, const OutputMeasure& b);
 
 /// The measures that compare series, 0-based; of several that compare the same pair only the first.
