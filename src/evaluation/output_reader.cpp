@@ -291,9 +291,11 @@ void OutputReader::noteUnusedObservations(std::size_t i, const MeasureStatistics
       {i, pairs,
        fmt::format(
            "output measure \"{}\": {} of {} observations in the evaluation period are not used, as item No. {} of "
-           "{} has no value at their time; the first is at {}",
+           "{} {}; the first is at {}",
            trimTrailing(measure.name), statistics.observationCount - pairs, statistics.observationCount,
-           measure.simulation.itemNo, trimTrailing(measure.simulation.fileName), formatDate(*statistics.firstUnused))});
+           measure.simulation.itemNo, trimTrailing(measure.simulation.fileName),
+           measure.timeMatch.kind == TimeMatch::mean ? "lacks a value on their day" : "has no value at their time",
+           formatDate(*statistics.firstUnused))});
 }
 
 }  // namespace mirevo

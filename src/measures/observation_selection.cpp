@@ -87,16 +87,18 @@ bool ObservationFilter::isJoined(double from, double to) const {
   return true;
 }
 
-void keepCounted(PeriodSeries& observations, const OutputMeasure& measure, const EvaluationPeriod& period) {
-  const EvaluationPeriod counted = countedPeriod(measure, period);
-  const std::int64_t first = secondNumber(counted.start);
-  const std::int64_t last = secondNumber(counted.end);
+void keepCounted(PeriodSeries& observations, const OutputMeasure& measure, const EvaluationPeriod& period,
+                 std::span<const EvaluationPeriod> others) {
+  std::vector<EvaluationPeriod> periods(others.begin(), others.end());
+  periods.push_back(countedPeriod(measure, period));
   const ObservationFilter filter(measure.selection, period.start);
   const std::int64_t origin = secondNumber(period.start);
   for (std::size_t i = 0; i < observations.seconds.size(); ++i) {
     const std::int64_t second = observations.seconds[i];
     const double days = static_cast<double>(second - origin) / kSecondsPerDay;
-    const bool isInside = second >= first && second <= last;
+    const bool isInside = std::ranges::any_of(periods, [second](const EvaluationPeriod& one) {
+      return second >= secondNumber(one.start) && second <= secondNumber(one.end);
+    });
     if (!isInside || !filter.counts(days, observations.values[i])) {
       observations.values[i] = std::numeric_limits<float>::quiet_NaN();
     }

@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <limits>
 #include <optional>
+#include <span>
 #include <string>
 #include <vector>
 
@@ -58,8 +59,10 @@ class ObservationFilter {
   float highest_ = std::numeric_limits<float>::infinity();
 };
 
-/// Makes the observations that do not count for the measure missing.
-void keepCounted(PeriodSeries& observations, const OutputMeasure& measure, const EvaluationPeriod& period);
+/// Makes the observations that do not count for the measure missing. In `others`, further periods, months and limits
+/// hold, but neither the measure's own period nor a warm-up.
+void keepCounted(PeriodSeries& observations, const OutputMeasure& measure, const EvaluationPeriod& period,
+                 std::span<const EvaluationPeriod> others = {});
 
 /// For people: the settings that leave observations out, "Months = 11, 12, Lowest_Observed = 0.5"; empty if there are
 /// none.
