@@ -93,15 +93,18 @@ RunComparison OutputReader::runComparison() const {
 
 std::optional<std::int64_t> OutputReader::observationLeftOut(std::size_t measure) {
   constexpr std::int64_t kSecondsOfDay = 86400;
-  EvaluationPeriod rest{description_.period.end, description_.period.end};
+  const OutputMeasure& compared = description_.measures[measure];
+  const DateRecord last = countedPeriod(compared, description_.period).end;
+  EvaluationPeriod rest{last, last};
   const std::int64_t end = secondNumber(rest.start);
   if (end % kSecondsOfDay != 0) return std::nullopt;
   rest.end = dateOfSecond(end + kSecondsOfDay - 1);
-  const PeriodSeries series =
-      readPeriodObservations(series_.observation(measure), description_.measures[measure], rest);
+  const PeriodSeries series = readPeriodObservations(series_.observation(measure), compared, rest);
+  const ObservationFilter filter(compared.selection, last);
   for (std::size_t i = 0; i < series.seconds.size(); ++i) {
     const bool isOfDay = series.seconds[i] > end && series.seconds[i] < end + kSecondsOfDay;
-    if (isOfDay && !std::isnan(series.values[i])) return series.seconds[i];
+    const double days = static_cast<double>(series.seconds[i] - end) / kSecondsPerDay;
+    if (isOfDay && !std::isnan(series.values[i]) && filter.counts(days, series.values[i])) return series.seconds[i];
   }
   return std::nullopt;
 }
@@ -111,6 +114,7 @@ std::vector<PeriodSeries> OutputReader::readShownObservations() {
   for (const std::size_t i : shownMeasures_) {
     observations.push_back(
         readPeriodObservations(series_.observation(i), description_.measures[i], description_.period));
+    keepCounted(observations.back(), description_.measures[i], description_.period);
   }
   return observations;
 }
@@ -153,7 +157,8 @@ EvaluationResult OutputReader::read(const OutputFiles& files) {
 std::vector<PeriodSeries> OutputReader::readShownSeries() {
   std::vector<PeriodSeries> shown;
   for (const std::size_t i : shownMeasures_) {
-    shown.push_back(readPeriodSeries(series_.simulation(i), description_.measures[i].simulation, description_.period));
+    shown.push_back(readMatchedSeries(series_.simulation(i), series_.observation(i), description_.measures[i],
+                                      description_.period));
   }
   return shown;
 }
@@ -291,9 +296,11 @@ void OutputReader::noteUnusedObservations(std::size_t i, const MeasureStatistics
       {i, pairs,
        fmt::format(
            "output measure \"{}\": {} of {} observations in the evaluation period are not used, as item No. {} of "
-           "{} has no value at their time; the first is at {}",
+           "{} {}; the first is at {}",
            trimTrailing(measure.name), statistics.observationCount - pairs, statistics.observationCount,
-           measure.simulation.itemNo, trimTrailing(measure.simulation.fileName), formatDate(*statistics.firstUnused))});
+           measure.simulation.itemNo, trimTrailing(measure.simulation.fileName),
+           measure.timeMatch.kind == TimeMatch::mean ? "lacks a value on their day" : "has no value at their time",
+           formatDate(*statistics.firstUnused))});
 }
 
 }  // namespace mirevo

@@ -93,9 +93,10 @@ double percent(double simulated, double observed) {
 }
 
 /// The integral over the times, linear between them.
-double volumeOf(std::span<const double> values, std::span<const double> times) {
+double volumeOf(std::span<const double> values, std::span<const double> times, std::span<const std::size_t> breaks) {
   double volume = 0.0;
   for (std::size_t i = 1; i < values.size(); ++i) {
+    if (std::binary_search(breaks.begin(), breaks.end(), i)) continue;
     volume += (times[i] - times[i - 1]) * (values[i] + values[i - 1]) / 2.0;
   }
   return volume;
@@ -224,8 +225,8 @@ double peakTimeError(ValuePairs pairs, std::span<const double> times) {
   return peakTime(pairs.simulated) - peakTime(pairs.observed);
 }
 
-double volumeError(ValuePairs pairs, std::span<const double> times) {
-  return percent(volumeOf(pairs.simulated, times), volumeOf(pairs.observed, times));
+double volumeError(ValuePairs pairs, std::span<const double> times, std::span<const std::size_t> breaks) {
+  return percent(volumeOf(pairs.simulated, times, breaks), volumeOf(pairs.observed, times, breaks));
 }
 
 double highFlowBias(ValuePairs pairs) {

@@ -70,8 +70,9 @@ double peakError(ValuePairs pairs);
 double peakTimeError(ValuePairs pairs, std::span<const double> times);
 
 /// 100 (simulated - observed volume) over the observed one; a volume is the integral of the values over `times`, linear
-/// between them. Undefined with fewer than two pairs, or if the observed volume is 0.
-double volumeError(ValuePairs pairs, std::span<const double> times);
+/// between them, but not over what is before each of the pairs `breaks` (ascending). Undefined with fewer than two
+/// pairs, or if the observed volume is 0.
+double volumeError(ValuePairs pairs, std::span<const double> times, std::span<const std::size_t> breaks = {});
 
 // Three segments of the flow duration curve, each curve of its own series in descending order, the value in place i of
 // n having the exceedance probability i/(n + 1): Yilmaz, Gupta and Wagener (2008), doi:10.1029/2007WR006716. In per

@@ -50,9 +50,9 @@ struct SeriesItem {
   std::optional<std::span<const double>> exact;  ///< its values in 64 bits; none where those in 32 bits are used
   std::vector<double> weights = {};              ///< one per step, 0 for a value that does not count; empty: each 1
 
-  std::optional<double> valueAtTime(double time, std::size_t& hint, double largestGap) const {
-    if (exact) return exactValueAt(series.times(), *exact, time, hint, largestGap);
-    return valueAt(series, item, time, hint, largestGap);
+  std::optional<double> valueFor(double time, std::size_t& hint, const TimeMatcher& matcher) const {
+    if (exact) return matcher.exactValueAt(*exact, time, hint);
+    return matcher.valueAt(item, time, hint);
   }
 };
 
@@ -112,12 +112,15 @@ std::string describeLackOf(const MeasureStatistics& statistics, const SeriesItem
   return describeLackOfObservations(observation.series, observation.item, observation.fileName) + "\n";
 }
 
-/// Calls `use(time, observed, weight, simulated)` for every observation in the period that counts, in order, with its
-/// time in days on the simulation's axis and the simulated value there, if there is one; stops when that is false.
+/// Calls `use(time, observed, weight, simulated)` for every observation that counts for the measure and is not missing,
+/// in order, with its time in days on the simulation's axis and its simulated value, if there is one; stops when that is
+/// false.
 template <typename Use>
-void forEachObservation(const SeriesItem& simulation, const SeriesItem& observation, const EvaluationPeriod& period,
-                        const Use& use) {
-  const Period days = periodOn(simulation.start, period);
+void forEachObservation(const OutputMeasure& measure, const SeriesItem& simulation, const SeriesItem& observation,
+                        const EvaluationPeriod& period, const Use& use) {
+  const Period days = periodOn(simulation.start, countedPeriod(measure, period));
+  const TimeMatcher matcher(measure.timeMatch, simulation.series, simulation.start, period.largestGapDays());
+  const ObservationFilter filter(measure.selection, observation.start);
   // Observation times on the simulation's axis: one offset of whole seconds, so equal times differ by rounding only,
   // which is far below the tolerance for the same time.
   const double offset = daysSince(simulation.start, observation.start);
@@ -128,11 +131,11 @@ void forEachObservation(const SeriesItem& simulation, const SeriesItem& observat
     const double time = times[k] + offset;
     if (time < days.start - kSameTimeDays) continue;
     if (time > days.end + kSameTimeDays) break;
-    if (isMissing(observed[k], observation.deleteValue)) continue;
+    if (isMissing(observed[k], observation.deleteValue) || !filter.counts(times[k], observed[k])) continue;
     const double weight = observation.weights.empty() ? 1.0 : observation.weights[k];
     if (weight == 0.0) continue;
     const double value = observation.exact ? (*observation.exact)[k] : observed[k];
-    if (!use(time, value, weight, simulation.valueAtTime(time, hint, period.largestGapDays()))) break;
+    if (!use(time, value, weight, simulation.valueFor(time, hint, matcher))) break;
   }
 }
 
@@ -140,12 +143,12 @@ void forEachObservation(const SeriesItem& simulation, const SeriesItem& observat
 constexpr double kShareOfMean = 0.01;
 
 /// The pairs in the period, and the number and first time of the observations without a simulated value.
-MeasureStatistics collectPairs(const SeriesItem& simulation, const SeriesItem& observation,
-                               const EvaluationPeriod& period) {
+MeasureStatistics collectPairs(const OutputMeasure& measure, const SeriesItem& simulation,
+                               const SeriesItem& observation, const EvaluationPeriod& period) {
   MeasureStatistics statistics;
   std::optional<double> firstUnused;
   double sumOfObserved = 0.0;
-  forEachObservation(simulation, observation, period,
+  forEachObservation(measure, simulation, observation, period,
                      [&](double time, double observed, double weight, const std::optional<double>& simulated) {
                        ++statistics.observationCount;
                        sumOfObserved += observed;
@@ -170,6 +173,29 @@ MeasureStatistics collectPairs(const SeriesItem& simulation, const SeriesItem& o
   statistics.epsilon = kShareOfMean * std::abs(sumOfObserved / static_cast<double>(statistics.observationCount));
   if (firstUnused) statistics.firstUnused = dateOfSecond(secondAfter(secondNumber(simulation.start), *firstUnused));
   return statistics;
+}
+
+/// Finds the pairs that are not joined with the one before, where observations are left out inside the period.
+void addBreaks(const OutputMeasure& measure, const SeriesItem& simulation, const SeriesItem& observation,
+               MeasureStatistics& statistics) {
+  if (!measure.selection.leavesHoles()) return;
+  const ObservationFilter filter(measure.selection, observation.start);
+  const double offset = daysSince(simulation.start, observation.start);
+  const std::span<const double> times = observation.series.times();
+  const std::span<const float> values = observation.series.values(observation.item);
+  std::size_t pair = 0;
+  std::size_t before = 0;  // step of the previous pair
+  bool isBroken = false;
+  for (std::size_t k = 0; k < times.size() && pair < statistics.times.size(); ++k) {
+    if (times[k] + offset < statistics.times[pair]) {
+      isBroken = isBroken || (!isMissing(values[k], observation.deleteValue) && !filter.counts(times[k], values[k]));
+      continue;
+    }
+    if (pair > 0 && (isBroken || !filter.isJoined(times[before], times[k]))) statistics.breaks.push_back(pair);
+    isBroken = false;
+    before = k;
+    ++pair;
+  }
 }
 
 /// Mean, root mean square and standard deviation over the pairs, in observation order, every operation in this number.
@@ -245,6 +271,15 @@ void addPeakStatistics(const SeriesItem& simulation, const SeriesItem& observati
   statistics.lowDifference = weights.difference(simulatedMin, observedMin);
 }
 
+/// Where extremes of the files might be those of other observations, or of single steps instead of means.
+template <class Number>
+void addPeaksOfPairs(const Weights<Number>& weights, MeasureStatistics& statistics) {
+  const auto [simulatedMin, simulatedMax] = std::ranges::minmax(statistics.simulatedValues);
+  const auto [observedMin, observedMax] = std::ranges::minmax(statistics.observedValues);
+  statistics.peakDifference = weights.difference(simulatedMax, observedMax);
+  statistics.lowDifference = weights.difference(simulatedMin, observedMin);
+}
+
 void transformPairs(const OutputMeasure& measure, MeasureStatistics& statistics) {
   if (measure.epsilon) statistics.epsilon = *measure.epsilon;
   const ValueTransformation used = transformationOf(measure);
@@ -280,11 +315,17 @@ MeasureStatistics computeMeasureStatistics(const OutputMeasure& measure, const E
                                            double weightAbove, bool wantPeaks, SeriesPrecision precision) {
   const SeriesItem simulated = readItem(simulation, measure.simulation, precision);
   const SeriesItem observed = readObservedItem(observation, measure, period, precision);
-  MeasureStatistics statistics = collectPairs(simulated, observed, period);
+  MeasureStatistics statistics = collectPairs(measure, simulated, observed, period);
+  addBreaks(measure, simulated, observed, statistics);
   transformPairs(measure, statistics);
   const auto add = [&](const auto& weights) {
     addDifferenceStatistics(weights, statistics);
-    if (wantPeaks) addPeakStatistics(simulated, observed, period, weights, statistics);
+    if (!wantPeaks) return;
+    if (measure.selection.leavesHoles() || !measure.timeMatch.isUsual()) {
+      addPeaksOfPairs(weights, statistics);
+    } else {
+      addPeakStatistics(simulated, observed, countedPeriod(measure, period), weights, statistics);
+    }
   };
   if (precision == SeriesPrecision::exact) {
     add(Weights<double>{weight, weightAbove});
@@ -304,7 +345,7 @@ MeasureStatistics computeMeasureStatistics(const OutputMeasure& measure, const E
 bool hasPairs(const OutputMeasure& measure, const EvaluationPeriod& period, TimeSeriesObject& simulation,
               TimeSeriesObject& observation) {
   bool found = false;
-  forEachObservation(readItem(simulation, measure.simulation, SeriesPrecision::single),
+  forEachObservation(measure, readItem(simulation, measure.simulation, SeriesPrecision::single),
                      readObservedItem(observation, measure, period, SeriesPrecision::single), period,
                      [&found](double, double, double, const std::optional<double>& simulated) {
                        found = simulated.has_value();

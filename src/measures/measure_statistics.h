@@ -32,10 +32,12 @@ struct MeasureStatistics {
   std::vector<double> simulatedValues;  ///< one per pair
   std::vector<double> observedValues;   ///< one per pair
   std::vector<double> weights;          ///< of the observations, one per pair; empty: each 1
+  /// The pairs between which and the one before are observations, or months, that do not count.
+  std::vector<std::size_t> breaks;
   /// The pairs as the statistics compare them, if that is not as they are.
   std::optional<TransformedPairs> transformed;
   double epsilon = 0.0;                   ///< the small value that is added where a logarithm or inverse is taken
-  std::size_t observationCount = 0;       ///< observations in the period that are not missing, whether used or not
+  std::size_t observationCount = 0;       ///< observations that count and are not missing, whether used or not
   std::optional<DateRecord> firstUnused;  ///< time of the first observation without a simulated value
 };
 
@@ -48,9 +50,10 @@ void requireItem(TimeSeriesObject& series, const SeriesReference& reference);
 
 /// Statistics of the weighted differences simulated minus observed: `weight` times a difference that is not positive,
 /// `weightAbove` times one that is, times the weight of the observation. The period includes both ends. Missing
-/// observations, those of weight 0, and those without a simulated value at their time do not count. The peak and low
-/// differences are computed only if `wantPeaks`. The two files may start at different times; equal times always match.
-/// Throws FatalError with the fixed texts.
+/// observations, those that the measure leaves out, those of weight 0, and those without a simulated value do not count.
+/// The peak and low differences are computed only if `wantPeaks`: from the pairs, if observations are left out inside
+/// the period or are not compared with the simulated value at their time. The two files may start at different times;
+/// equal times always match. Throws FatalError with the fixed texts.
 MeasureStatistics computeMeasureStatistics(const OutputMeasure& measure, const EvaluationPeriod& period,
                                            TimeSeriesObject& simulation, TimeSeriesObject& observation, double weight,
                                            double weightAbove, bool wantPeaks,
@@ -61,7 +64,7 @@ MeasureStatistics computeMeasureStatistics(const OutputMeasure& measure, const E
                                            TimeSeriesObject& simulation, TimeSeriesObject& observation,
                                            SeriesPrecision precision = SeriesPrecision::single);
 
-/// Whether any observation in the period has a simulated value at its time, so that statistics can be computed. Throws
+/// Whether any observation that counts has a simulated value, so that statistics can be computed. Throws
 /// FatalError if the series cannot be read.
 bool hasPairs(const OutputMeasure& measure, const EvaluationPeriod& period, TimeSeriesObject& simulation,
               TimeSeriesObject& observation);

@@ -19,8 +19,10 @@ ObservedSeries readObservedSeries(std::size_t index, const OutputMeasure& measur
   const std::optional<DateRecord> start = observation.startTime();
   if (!start) return observed;
   observed.start = *start;
-  const double first = daysSince(*start, period.start) - kSameTimeDays;
-  const double last = daysSince(*start, period.end) + kSameTimeDays;
+  const EvaluationPeriod counted = countedPeriod(measure, period);
+  const double first = daysSince(*start, counted.start) - kSameTimeDays;
+  const double last = daysSince(*start, counted.end) + kSameTimeDays;
+  const ObservationFilter filter(measure.selection, *start);
   const std::span<const double> times = observation.times();
   const std::span<const float> values = observation.values(measure.observation.itemNo);
   std::span<const double> exact;
@@ -29,6 +31,7 @@ ObservedSeries readObservedSeries(std::size_t index, const OutputMeasure& measur
   for (std::size_t k = 0; k < times.size(); ++k) {
     if (times[k] < first || times[k] > last || isMissing(values[k], observation.deleteValue())) continue;
     if (!weights.empty() && weights[k] == 0.0) continue;
+    if (!filter.counts(times[k], values[k])) continue;
     observed.days.push_back(times[k]);
     if (!weights.empty()) observed.weights.push_back(weights[k]);
     observed.values.push_back(precision == SeriesPrecision::exact ? exact[k] : values[k]);
@@ -66,6 +69,7 @@ void appendSimulatedValues(const ObservedSeries& observed, const OutputMeasure& 
   const std::optional<DateRecord> start = simulation.startTime();
   const double offset = start ? daysSince(*start, observed.start) : 0.0;
   const int item = measure.simulation.itemNo;
+  const TimeMatcher matcher(measure.timeMatch, simulation, start.value_or(observed.start), largestGap);
   const auto append = [&](const auto& valueAtTime) {
     std::size_t hint = 0;
     for (const double days : observed.days) {
@@ -74,15 +78,11 @@ void appendSimulatedValues(const ObservedSeries& observed, const OutputMeasure& 
     }
   };
   if (precision == SeriesPrecision::single) {
-    append([&](double days, std::size_t& hint) -> std::optional<double> {
-      return valueAt(simulation, item, days, hint, largestGap);
-    });
+    append([&](double days, std::size_t& hint) -> std::optional<double> { return matcher.valueAt(item, days, hint); });
     return;
   }
   const auto appendExact = [&](std::span<const double> series) {
-    append([&](double days, std::size_t& hint) {
-      return exactValueAt(simulation.times(), series, days, hint, largestGap);
-    });
+    append([&](double days, std::size_t& hint) { return matcher.exactValueAt(series, days, hint); });
   };
   appendExact(simulation.exactValues(item));
   appendExact(simulation.units(item));

@@ -10,7 +10,7 @@
 
 namespace mirevo {
 
-/// The observations of one output measure: those in the evaluation period that count. They are the same for
+/// The observations of one output measure: those that count and are not missing. They are the same for
 /// all evaluations of a run, so that simulated values at their times can be compared between evaluations.
 struct ObservedSeries {
   std::size_t measure = 0;           ///< 0-based index of the output measure
@@ -31,7 +31,7 @@ double usualMarkerAmong(std::span<const double> values);
 /// How many numbers appendSimulatedValues() appends for these series.
 std::size_t simulatedValueCount(std::span<const ObservedSeries> observed, SeriesPrecision precision);
 
-/// Appends the simulated value at each observation time to `values`, NaN where there is none, as between steps farther
+/// Appends the simulated value for each observation to `values`, NaN where there is none, as between steps farther
 /// apart than `largestGap` (days). If exact, the unit in which the file gives each of them follows (interpolated as the
 /// values are), NaN where there is none.
 void appendSimulatedValues(const ObservedSeries& observed, const OutputMeasure& measure, SeriesPrecision precision,

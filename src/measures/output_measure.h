@@ -8,6 +8,8 @@
 #include "common/date_record.h"
 #include "common/settings/code_name.h"
 #include "measures/observation_weights.h"
+#include "measures/observation_selection.h"
+#include "measures/time_match.h"
 #include "platform/series/time_series_object.h"
 
 namespace mirevo {
@@ -62,7 +64,9 @@ struct OutputMeasure {
   std::string functionName;    ///< the objective function that it belongs to; empty: none
   SeriesReference simulation;  ///< in or below the base folder
   SeriesReference observation;
-  ObservationWeighting weighting;  ///< of the observations
+  ObservationWeighting weighting = {};  ///< of the observations
+  ObservationSelection selection = {};
+  TimeMatching timeMatch = {};
 };
 
 /// Values of series in 32 bits, as the statistics of a run use them, or with all digits of their file.
@@ -74,6 +78,7 @@ struct EvaluationPeriod {
   DateRecord end{};
   /// Those between two simulated steps farther apart than this have no simulated value; 0: interpolated over any gap.
   double largestGapHours = 0.0;
+  double warmUpDays = 0.0;  ///< from the start on, in which observations count for no measure
 
   double largestGapDays() const { return largestGapHours > 0.0 ? largestGapHours / 24.0 : kAnyGap; }
 };

@@ -78,7 +78,8 @@ bool isSameItems(const OutputMeasure& a, const OutputMeasure& b) {
   const auto isSame = [](const SeriesReference& left, const SeriesReference& right) {
     return left.fileName == right.fileName && left.itemNo == right.itemNo;
   };
-  return isSame(a.simulation, b.simulation) && isSame(a.observation, b.observation);
+  return isSame(a.simulation, b.simulation) && isSame(a.observation, b.observation) &&
+         a.selection.isSameAs(b.selection) && a.timeMatch == b.timeMatch;
 }
 
 bool isSamePair(const OutputMeasure& a, const OutputMeasure& b) {

@@ -169,6 +169,7 @@ void SeriesTables::checkItems(std::span<const OutputMeasure> measures, const Eva
     const ObservedSeries observed = readObservedSeries(i, measures[i], period, SeriesPrecision::single, observation(i));
     if (isForRuns) {
       requireCounting(observation(i), measures[i], period);
+      checkSelection(observed, measures[i], period);
       requireObservations(observed, measures[i], period);
       requireDefined(observed, measures[i]);
     }
@@ -205,6 +206,43 @@ void SeriesTables::requireObservations(const ObservedSeries& observed, const Out
       fmt::format("{}{}\nthe evaluation period is {} to {}\n{}", location,
                   describeLackOfObservations(series, measure.observation.itemNo, name), formatDate(period.start),
                   formatDate(period.end), describeSpan(series, name)));
+}
+
+void SeriesTables::checkSelection(const ObservedSeries& observed, const OutputMeasure& measure,
+                                  const EvaluationPeriod& period) {
+  constexpr std::size_t kFew = 10;
+  const std::size_t count = observed.values.size();
+  const bool isSelected = period.warmUpDays > 0.0 || !describeSelection(measure.selection).empty();
+  if (isSelected && count < kFew) {
+    OutputMeasure all = measure;
+    all.selection = {};
+    const EvaluationPeriod whole{period.start, period.end};
+    TimeSeriesObject& series = observation(observed.measure);
+    const std::size_t countOfAll =
+        readObservedSeries(observed.measure, all, whole, SeriesPrecision::single, series).values.size();
+    const std::string& location =
+        measure.selection.location.empty() ? measure.observation.fileLocation : measure.selection.location;
+    const std::string selected = fmt::format("{}: {}", observationNames_[observationIndex_[observed.measure]],
+                                             describeSelected(measure, period, series));
+    if (count == 0 && countOfAll > 0) {
+      fatalError("Error: No observation counts for output measure " + measure.name, location + selected);
+    }
+    if (count < countOfAll) {
+      addWarning(location, fmt::format("few observations count for output measure {}: {}",
+                                       quotedForMessage(measure.name), selected));
+    }
+  }
+  if (measure.timeMatch.kind != TimeMatch::mean || count == 0) return;
+  const std::int64_t origin = secondNumber(observed.start);
+  const auto dayOf = [origin](double days) { return dateOfSecond(secondAfter(origin, days))[date_field::kDay]; };
+  const auto repeated = std::adjacent_find(observed.days.begin(), observed.days.end(),
+                                           [&](double a, double b) { return b - a < 1.0 && dayOf(a) == dayOf(b); });
+  if (repeated == observed.days.end()) return;
+  addWarning(measure.observation.fileLocation,
+             fmt::format("{} has several observations on one day, the first on {}: with Time_Match = 'mean' each is "
+                         "compared with the mean of the whole day",
+                         observationNames_[observationIndex_[observed.measure]],
+                         formatDate(dateOfSecond(secondAfter(origin, *repeated)))));
 }
 
 void SeriesTables::requireDefined(const ObservedSeries& observed, const OutputMeasure& measure) {

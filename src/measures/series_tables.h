@@ -68,6 +68,9 @@ class SeriesTables final {
   /// Throws FatalError, as the first model run would, if there are none.
   void requireObservations(const ObservedSeries& observed, const OutputMeasure& measure,
                            const EvaluationPeriod& period);
+  /// Throws FatalError if the settings that leave observations out leave none; warns of few, and of observations that
+  /// share a simulated day.
+  void checkSelection(const ObservedSeries& observed, const OutputMeasure& measure, const EvaluationPeriod& period);
   /// Throws FatalError if the statistic cannot be computed for these observations, whatever the model does; warns if it
   /// cannot be where all of them are compared.
   void requireDefined(const ObservedSeries& observed, const OutputMeasure& measure);

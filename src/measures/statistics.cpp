@@ -53,9 +53,8 @@ double rSquared(const MeasureStatistics& statistics) {
   return r * r;
 }
 
-template <double (*Criterion)(ValuePairs, std::span<const double>)>
-double withTimes(const MeasureStatistics& statistics) {
-  return Criterion(comparedPairs(statistics), statistics.times);
+double volumeErrorOfRuns(const MeasureStatistics& statistics) {
+  return volumeError(comparedPairs(statistics), statistics.times, statistics.breaks);
 }
 
 double peakTimeErrorInHours(const MeasureStatistics& statistics) {
@@ -195,7 +194,7 @@ constexpr auto kTable = std::to_array<Statistic>({
      .inObjective = magnitude},
     {.key = {std::nullopt, "volume error"},
      .description = "error of the volume [%]",
-     .value = withTimes<volumeError>,
+     .value = volumeErrorOfRuns,
      .best = Best::zero,
      .inObjective = share,
      .isOfSizes = true,

@@ -31,7 +31,8 @@ void warnOfLastDay(const RunConfig& config, OutputReader& output, RunLog& log) {
     log.warning(fmt::format(
         "End_Date = {} is the beginning of its day: the later observations of that day are left out (output "
         "measure {}, {} ...). With a time of day, such as 23:59, they count",
-        formatDate(config.period.end), quotedForMessage(config.measures[i].name), formatDate(dateOfSecond(*leftOut))));
+        formatDate(countedPeriod(config.measures[i], config.period).end), quotedForMessage(config.measures[i].name),
+        formatDate(dateOfSecond(*leftOut))));
   }
 }
 

@@ -122,6 +122,25 @@ TEST_F(SeriesTablesTest, WeightsThatCannotBeMeantEndTheRunOrAreWarnedOf) {
   }
 }
 
+TEST_F(SeriesTablesTest, ASelectionThatLeavesNoObservationEndsTheRunBeforeItBegins) {
+  folder_.write("days.csv", "time,Q\n2001-01-01,2\n2001-01-02,3\n2001-02-01,4\n2001-02-01 12:00,5\n");
+  OutputMeasure selected = measure("sim.csv", "days.csv");
+  selected.name = "Flow";
+  selected.selection = {.months = {2, 3}, .lowestObserved = 5, .location = "s.kdx:9:3: Months: "};
+  EvaluationPeriod period = kPeriod;
+  period.warmUpDays = 1;
+  const auto warnings = [&] { return SeriesTables::MirevoTSobjectInit(std::vector{selected}, period).warnings(); };
+  EXPECT_THAT(warnings(), ElementsAre("s.kdx:9:3: Months: few observations count for output measure \"Flow\": " +
+                                      folder_ / "days.csv" +
+                                      ": 4 observations in the evaluation period, 3 of them left by Warm_Up_Days = 1, "
+                                      "2 of them left by Months = 2, 3, 1 of them left by Lowest_Observed = 5"));
+  selected.selection.lowestObserved = 5.5;
+  EXPECT_THAT(refusalOf(warnings), StartsWith("Error: No observation counts for output measure Flow\ns.kdx:9:3: "));
+  selected.selection = {};
+  selected.timeMatch.kind = TimeMatch::mean;
+  EXPECT_THAT(warnings(), Contains(HasSubstr("several observations on one day, the first on 2001-02-01 00:00")));
+}
+
 TEST_F(SeriesTablesTest, SetupFailuresEndTheRun) {
   folder_.write("bad.csv", "time,Q\n2001-01-01,1,2\n");
   folder_.write("text.csv", "time,Q\n2001-01-01,bad\n");

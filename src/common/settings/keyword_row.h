@@ -144,7 +144,9 @@ constexpr KeywordType typeOf() {
   if constexpr (std::is_same_v<Field, std::string>) return KeywordType::text;
   if constexpr (std::is_same_v<Field, std::vector<std::string>>) return KeywordType::textLines;
   if constexpr (std::is_same_v<Field, std::vector<double>>) return KeywordType::realList;
-  if constexpr (std::is_same_v<Field, DateRecord>) return KeywordType::date;
+  if constexpr (std::is_same_v<Field, DateRecord> || std::is_same_v<Field, std::optional<DateRecord>>) {
+    return KeywordType::date;
+  }
   return KeywordType::integer;
 }
 
@@ -157,6 +159,8 @@ void assign(Field& field, const SetupValue& value) {
     field = (std::get<std::int32_t>(value) & 1) != 0;  // the lowest bit: -1 means yes, too
   } else if constexpr (std::is_same_v<Field, std::optional<double>>) {
     field = std::get<double>(value);
+  } else if constexpr (std::is_same_v<Field, std::optional<DateRecord>>) {
+    field = std::get<DateRecord>(value);
   } else if constexpr (std::is_same_v<Field, std::vector<std::string>>) {
     field.push_back(std::get<std::string>(value));
   } else {

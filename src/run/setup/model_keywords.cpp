@@ -1,6 +1,9 @@
 #include "run/setup/model_keywords.h"
 
+#include <algorithm>
+#include <iterator>
 #include <map>
+#include <span>
 #include <tuple>
 #include <utility>
 #include <vector>
@@ -33,6 +36,81 @@ KeywordRow weightingItem(ItemOf, std::string_view name, std::string_view meaning
                                  .range = from(1),
                                  .refusal = "Error: Item number invalid for output measure ",
                                  .meaning = std::string(meaning)});
+}
+
+/// The enumerator of a code that has a name only.
+template <class Enum>
+Enum enumeratorNamed(std::span<const CodeName> codes, const std::string& name) {
+  const auto found = std::ranges::find(codes, std::string_view(name), &CodeName::name);
+  return static_cast<Enum>(found - codes.begin());
+}
+
+/// The section with more keywords behind its own.
+SectionRow withRows(SectionRow section, std::vector<KeywordRow> rows) {
+  section.keywords.insert(section.keywords.end(), std::make_move_iterator(rows.begin()),
+                          std::make_move_iterator(rows.end()));
+  return section;
+}
+
+/// Which observations count for a measure, and what they are compared with.
+std::vector<KeywordRow> pairingRows() {
+  using Measure = OutputMeasure;
+  return {
+      setting<Measure>([](auto& m) -> auto& { return m.selection.start; },
+                       {.name = "Start_Date",
+                        .defaultValue = kNoDefault,
+                        .meaning = "Start of a period of the measure's own, inclusive, inside the evaluation period. "
+                                   "Without it, that of the evaluation period."}),
+      setting<Measure>([](auto& m) -> auto& { return m.selection.end; },
+                       {.name = "End_Date",
+                        .defaultValue = kNoDefault,
+                        .meaning = "Its end, likewise; a date alone means its 00:00."}),
+      setting<Measure>([](auto& m) -> auto& { return m.selection.months; },
+                       {.name = "Months",
+                        .defaultValue = kNoDefault,
+                        .meaning = "Numbers, 1 to 12, of the months whose observations count. Without it, all."}),
+      setting<Measure>([](auto& m) -> auto& { return m.selection.lowestObserved; },
+                       {.name = "Lowest_Observed",
+                        .defaultValue = kNoDefault,
+                        .unit = "of the series",
+                        .meaning = "Observations below this value do not count."}),
+      checked<Measure>(setting<Measure>([](auto& m) -> auto& { return m.selection.highestObserved; },
+                                        {.name = "Highest_Observed",
+                                         .defaultValue = kNoDefault,
+                                         .unit = "of the series",
+                                         .meaning = "Observations above this value do not count."}),
+                       [](const Measure& measure) { return validateSelection(measure); }),
+      choice<Measure>(
+          [](Measure& measure, const SetupValue& value) {
+            measure.timeMatch.kind = enumeratorNamed<TimeMatch>(kTimeMatchNames, std::get<std::string>(value));
+          },
+          {.name = "Time_Match",
+           .defaultValue = "'interpolate'",
+           .codes = kTimeMatchNames,
+           .meaning = "What an observation is compared with: the simulated value at its time, interpolated between "
+                      "two steps; only a simulated step at its time; the mean of the simulated steps of its day."}),
+      setting<Measure>([](auto& m) -> auto& { return m.timeMatch.offsetHours; },
+                       {.name = "Time_Offset",
+                        .defaultValue = "0.0",
+                        .unit = "h",
+                        .meaning = "Simulated time is observed time plus this: -1 for a gauge in UTC+1 and a model in "
+                                   "UTC."}),
+      setting<Measure>([](auto& m) -> auto& { return m.timeMatch.dayBeginsHours; },
+                       {.name = "Day_Begins",
+                        .defaultValue = "0.0",
+                        .range = between(0, 24),
+                        .refusal = "Error: Beginning of the day invalid for output measure ",
+                        .unit = "h",
+                        .meaning = "Observed time of day at which the days of `Time_Match = 'mean'` begin and end."}),
+      choice<Measure>(
+          [](Measure& measure, const SetupValue& value) {
+            measure.timeMatch.dayStamp = enumeratorNamed<DayStamp>(kDayStampNames, std::get<std::string>(value));
+          },
+          {.name = "Day_Stamp",
+           .defaultValue = "'start'",
+           .codes = kDayStampNames,
+           .meaning = "Whether the date of a daily observation is that on which its day begins, at `Day_Begins`, or "
+                      "that on which it ends."})};
 }
 
 }  // namespace
@@ -225,13 +303,23 @@ const SettingSection<RunConfig>& judgementSection() {
                             .unit = "h",
                             .meaning = "Longest time between two simulated steps over which is interpolated; an "
                                        "observation in a longer gap has no simulated value. 0: interpolated over any "
-                                       "gap."})}}};
+                                       "gap."}),
+        checked<RunConfig>(setting<RunConfig>([](auto& c) -> auto& { return c.period.warmUpDays; },
+                                              {.name = "Warm_Up_Days",
+                                               .defaultValue = "0.0",
+                                               .range = kNonNegative,
+                                               .refusal = "Error: Warm-up invalid",
+                                               .unit = "d",
+                                               .meaning = "Time from the start of the evaluation period in which "
+                                                          "observations count for no output measure. Shorter than "
+                                                          "the period."}),
+                           [](const RunConfig& config) { return validateWarmUp(config.period); })}}};
   return section;
 }
 
 const SettingSection<OutputMeasure>& measureSection() {
   using Measure = OutputMeasure;
-  static const SettingSection<OutputMeasure> section{
+  static const SettingSection<OutputMeasure> section{withRows(
       {"ObjectiveFunctions/OUTPUT_MEASURES/MEASURE_n",
        "for each item",
        "A comparison of a simulated with an observed series reduced to one number, or a number that the model wrote.",
@@ -302,7 +390,8 @@ const SettingSection<OutputMeasure>& measureSection() {
                                          .defaultValue = "''",
                                          .meaning = "The objective function that the measure belongs to; if blank, the "
                                                     "measure is only reported."})},
-       itemName<Measure>([](const Measure& measure) { return measure.name; })}};
+       itemName<Measure>([](const Measure& measure) { return measure.name; })},
+      pairingRows())};
   return section;
 }
 

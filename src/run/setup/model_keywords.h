@@ -1,5 +1,6 @@
 #pragma once
 
+#include <string_view>
 #include <vector>
 
 #include "common/settings/keyword_row.h"
@@ -15,6 +16,11 @@ struct ObjectiveSection {
   ObjectiveFunction& function;
   NamesUsed& names;
 };
+
+/// Keywords of an output measure that leave observations out, and those that say what the others are compared with.
+inline constexpr std::string_view kSelectionKeywords[] = {"Start_Date", "End_Date", "Months", "Lowest_Observed",
+                                                          "Highest_Observed"};
+inline constexpr std::string_view kMatchingKeywords[] = {"Time_Match", "Time_Offset", "Day_Begins", "Day_Stamp"};
 
 const SettingSection<BatchItem>& batchItemSection();
 const SettingSection<ParameterFileItem>& parameterFileSection();

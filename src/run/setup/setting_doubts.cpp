@@ -1,9 +1,11 @@
 #include "run/setup/setting_doubts.h"
 
 #include <algorithm>
+#include <array>
 #include <cstddef>
 #include <cstdint>
 #include <filesystem>
+#include <span>
 #include <string_view>
 #include <unordered_map>
 
@@ -13,6 +15,7 @@
 #include "common/text.h"
 #include "measures/statistics.h"
 #include "parameters/search_space.h"
+#include "run/setup/model_keywords.h"
 #include "run/tasks/off_grid.h"
 
 namespace mirevo {
@@ -109,15 +112,27 @@ void warnOfStatistic(const OutputMeasure& measure, const SetupSection& section) 
   }
 }
 
+void warnOfMatching(const OutputMeasure& measure, const SetupSection& section) {
+  if (measure.timeMatch.kind == TimeMatch::mean) return;
+  for (const std::string_view keyword : {"Day_Begins", "Day_Stamp"}) {
+    if (section.isWritten(keyword)) section.warn(keyword, "has no effect without Time_Match = 'mean'");
+  }
+}
+
 /// Of a measure that the model computes itself.
 void warnOfModelsNumber(const OutputMeasure& measure, const SetupSection& section) {
   constexpr std::string_view kReason = "has no effect with Interface_Type = 1: the model's number is taken as it is";
   if (!statisticOf(measure.statisticType).key.code) {
     section.warn("Statistic_Type", fmt::format("{}, and a search makes it small", kReason));
   }
-  for (const std::string_view keyword : {"Transformation", "Epsilon", "Box_Cox_Lambda"}) {
-    if (section.isWritten(keyword)) section.warn(keyword, std::string(kReason));
-  }
+  const auto warnOf = [&](std::span<const std::string_view> keywords) {
+    for (const std::string_view keyword : keywords) {
+      if (section.isWritten(keyword)) section.warn(keyword, kReason);
+    }
+  };
+  warnOf(std::array<std::string_view, 3>{"Transformation", "Epsilon", "Box_Cox_Lambda"});
+  warnOf(kSelectionKeywords);
+  warnOf(kMatchingKeywords);
 }
 
 void warnOfMeasures(const RunConfig& config, const SectionsRead& sections) {
@@ -128,6 +143,7 @@ void warnOfMeasures(const RunConfig& config, const SectionsRead& sections) {
       continue;
     }
     warnOfStatistic(measure, sections.measures[i]);
+    warnOfMatching(measure, sections.measures[i]);
     if (isSameFile(measure.simulation.fileName, measure.observation.fileName)) {
       sections.measures[i].warn("Name",
                                 "the observed series is in the file of the simulated one, which the model writes");
@@ -199,6 +215,7 @@ void warnOfCoverage(const RunConfig& config, const SectionsRead& sections) {
   constexpr std::string_view kReason = "has no effect, as no output measure compares series";
   if (config.minimumCoverage > 0.0) sections.judgement->warn("Minimum_Coverage", kReason);
   if (config.period.largestGapHours > 0.0) sections.judgement->warn("Largest_Gap", kReason);
+  if (config.period.warmUpDays > 0.0) sections.judgement->warn("Warm_Up_Days", kReason);
 }
 
 void warnOfProcessFolder(const RunConfig& config, const SectionsRead& sections) {

@@ -48,6 +48,15 @@ std::vector<std::string> seriesSections(const SetupSection& target) {
   return paths;
 }
 
+/// What is wrong with a selection shows once the observations are read.
+void locateSelection(const SetupSection& section, ObservationSelection& selection) {
+  for (const std::string_view keyword : kSelectionKeywords) {
+    if (!section.isWritten(keyword)) continue;
+    selection.location = fmt::format("{}: {}: ", section.location(keyword), keyword);
+    return;
+  }
+}
+
 /// One method per section, called in the order of the sections; each checks what it has read before it returns.
 class SetupReader final {
  public:
@@ -240,6 +249,8 @@ void SetupReader::readObjectiveFunctions() {
   section.open("OUTPUT_MEASURES")
       .readItems("MEASURE_", measureSection(), config_.measures, "Error: No output measures defined",
                  [this](const SetupSection& opened, OutputMeasure& measure) {
+                   opened.require(validateOwnPeriod(measure, config_.period));
+                   locateSelection(opened, measure.selection);
                    readSeries(opened, measure);
                    sections_.measures.push_back(opened);
                  });

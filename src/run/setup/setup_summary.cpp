@@ -50,10 +50,15 @@ class Summary final {
 
   void addMeasures() {
     line("Evaluation period: {} to {}", formatDate(config_.period.start), formatDate(config_.period.end));
+    if (config_.period.warmUpDays > 0.0) {
+      line("Observations count from {} on, after a warm-up of {} days", formatDate(endOfWarmUp(config_.period)),
+           formatReal(config_.period.warmUpDays));
+    }
     line("Output measures: {}", config_.measures.size());
     for (const OutputMeasure& measure : config_.measures) {
       line("  {}: {}, {}{}, objective function {}", measure.name, statisticWithBest(measure), weightText(measure),
            describeWeighting(measure.weighting), measure.functionName.empty() ? "none" : measure.functionName);
+      addPairing(measure);
     }
     line("Objective functions: {}", config_.objectives.size());
     for (const ObjectiveFunction& function : config_.objectives) {
@@ -67,6 +72,16 @@ class Summary final {
     line("Aggregation: {}", config_.aggregationMethod == AggregationMethod::zero
                                 ? "every aggregate is 0"
                                 : aggregationMethodName(config_.aggregationMethod));
+  }
+
+  /// Which observations count and what they are compared with, if that is not as usual.
+  void addPairing(const OutputMeasure& measure) {
+    if (measure.interfaceType != InterfaceType::timeSeries) return;
+    const std::string selection = describeSelection(measure.selection);
+    const std::string matching = describeMatching(measure.timeMatch);
+    if (selection.empty() && matching.empty()) return;
+    line("    observations: {}{}{}", selection.empty() ? "all" : selection, matching.empty() ? "" : "; compared with ",
+         matching);
   }
 
   template <class... Values>

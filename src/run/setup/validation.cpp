@@ -86,6 +86,55 @@ std::optional<SettingRefusal> validateEvaluationPeriod(const EvaluationPeriod& p
       fmt::format("expected {} or later, found {}", formatDate(period.start), formatDate(period.end))};
 }
 
+std::optional<SettingRefusal> validateWarmUp(const EvaluationPeriod& period) {
+  const double days = daysSince(period.start, period.end);
+  if (period.warmUpDays == 0.0 || period.warmUpDays < days) return std::nullopt;
+  return SettingRefusal{"Error: Warm-up as long as the evaluation period", "Warm_Up_Days",
+                        fmt::format("expected less than {}, the days from {} to {}, found {}", formatReal(days),
+                                    formatDate(period.start), formatDate(period.end), formatReal(period.warmUpDays))};
+}
+
+std::optional<SettingRefusal> validateSelection(const OutputMeasure& measure) {
+  const ObservationSelection& selection = measure.selection;
+  for (const double month : selection.months) {
+    if (month >= 1.0 && month <= 12.0 && month == std::floor(month)) continue;
+    return SettingRefusal{"Error: Months invalid for output measure " + measure.name, "Months",
+                          fmt::format("expected whole numbers 1 to 12, found {}", formatReal(month))};
+  }
+  if (!selection.lowestObserved || !selection.highestObserved ||
+      *selection.lowestObserved <= *selection.highestObserved) {
+    return std::nullopt;
+  }
+  return SettingRefusal{"Error: Limits of the observed values invalid for output measure " + measure.name,
+                        "Highest_Observed",
+                        fmt::format("expected Lowest_Observed = {} or more, found {}",
+                                    formatReal(*selection.lowestObserved), formatReal(*selection.highestObserved))};
+}
+
+std::optional<SettingRefusal> validateOwnPeriod(const OutputMeasure& measure, const EvaluationPeriod& period) {
+  const std::string message = "Error: Period invalid for output measure " + measure.name;
+  const auto isBefore = [](const DateRecord& a, const DateRecord& b) { return daysSince(b, a) < 0.0; };
+  const auto refuse = [&](std::string_view keyword, std::string_view expected, const DateRecord& found) {
+    return SettingRefusal{message, keyword, fmt::format("expected {}, found {}", expected, formatDate(found))};
+  };
+  const std::string inside =
+      fmt::format("a time in the evaluation period, {} to {}", formatDate(period.start), formatDate(period.end));
+  for (const auto& [date, keyword] :
+       {std::pair(measure.selection.start, "Start_Date"), std::pair(measure.selection.end, "End_Date")}) {
+    if (!date) continue;
+    if (auto refusal = validateDate(*date, keyword)) return refusal;
+    if (isBefore(*date, period.start) || isBefore(period.end, *date)) return refuse(keyword, inside, *date);
+  }
+  if (!measure.selection.end) return std::nullopt;
+  const EvaluationPeriod counted = countedPeriod(measure, period);
+  if (!isBefore(counted.end, counted.start)) return std::nullopt;
+  const bool isWarmUp = !measure.selection.start || isBefore(*measure.selection.start, counted.start);
+  return refuse("End_Date",
+                fmt::format("{} or later, {}", formatDate(counted.start),
+                            isWarmUp ? "the end of the warm-up" : "the measure's Start_Date"),
+                *measure.selection.end);
+}
+
 std::optional<SettingRefusal> validateMeasurementNumber(const OutputMeasure& measure) {
   if (measure.interfaceType != InterfaceType::measureFile || measure.measurementNo >= 1) return std::nullopt;
   return SettingRefusal{"Error: Measurement No. invalid for output measure " + measure.name, "MeasurementNo",

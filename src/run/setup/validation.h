@@ -24,6 +24,12 @@ std::optional<SettingRefusal> validateParameterDefinition(const ModelParameter& 
 std::optional<SettingRefusal> validateEquations(const InternalConstraint& constraint);
 
 std::optional<SettingRefusal> validateEvaluationPeriod(const EvaluationPeriod& period);
+/// That the warm-up is shorter than the period.
+std::optional<SettingRefusal> validateWarmUp(const EvaluationPeriod& period);
+/// That months are such, and that the limits of a measure leave any value between them.
+std::optional<SettingRefusal> validateSelection(const OutputMeasure& measure);
+/// That the measure's own period is inside the evaluation period and not all of it in the warm-up.
+std::optional<SettingRefusal> validateOwnPeriod(const OutputMeasure& measure, const EvaluationPeriod& period);
 /// Checks the number of the value in the output-measure file, for a measure of interface type 1.
 std::optional<SettingRefusal> validateMeasurementNumber(const OutputMeasure& measure);
 /// That the statistic leaves the choice of a transformation to the setup.
