@@ -16,7 +16,7 @@ struct ObservedSeries {
   std::size_t measure = 0;     ///< 0-based index of the output measure
   DateRecord start{};          ///< origin of `days`
   std::vector<double> days;    ///< ascending
-  std::vector<double> values;  ///< one per time
+  std::vector<double> values;  ///< one per time; NaN where there is a simulated step alone, see addSimulatedSteps()
 };
 
 /// The period includes both ends. Throws FatalError if the item cannot be read.
