@@ -232,7 +232,7 @@ void UncertaintyTask::logRoom(const TaskContext& context) const {
   if (bytes < kMuch && !isShort) return;
   std::string text = fmt::format("The simulated values of {} sets take {} in {}", settings.sampleSize, sizeText(bytes),
                                  fileNameOf(path));
-  if (written > 0) text += fmt::format(", which has {} of them", sizeText(written));
+  if (written > 1'000'000) text += fmt::format(", which has {} of them", sizeText(written));
   if (!failed) text += fmt::format("; its disk has {} free", sizeText(disk.available));
   if (!isShort) return context.log.line(text);
   context.log.warning(text);
