@@ -233,10 +233,14 @@ void UncertaintyTask::logRoom(const TaskContext& context) const {
   std::string text = fmt::format("The simulated values of {} sets take {} in {}", settings.sampleSize, sizeText(bytes),
                                  fileNameOf(path));
   if (written > 1'000'000) text += fmt::format(", which has {} of them", sizeText(written));
-  if (!failed) text += fmt::format("; its disk has {} free", sizeText(disk.available));
-  if (!isShort) return context.log.line(text);
-  context.log.warning(text);
-  if (context.warnUser) context.warnUser(text);
+  if (!failed) text += fmt::format("; its disk has {} {}free", sizeText(disk.available), isShort ? "only " : "");
+  if (isShort && context.warnUser) {
+    context.warnUser(text);
+  } else if (isShort) {
+    context.log.warning(text);
+  } else {
+    context.log.line(text);
+  }
 }
 
 TaskOutcome UncertaintyTask::run(const TaskContext& context) {
