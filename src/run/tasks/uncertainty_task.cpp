@@ -233,7 +233,7 @@ void UncertaintyTask::logRoom(const TaskContext& context) const {
   std::string text = fmt::format("The simulated values of {} sets take {} in {}", settings.sampleSize, sizeText(bytes),
                                  fileNameOf(path));
   if (written > 1'000'000) text += fmt::format(", which has {} of them", sizeText(written));
-  if (!failed) text += fmt::format("; its disk has {} {}free", sizeText(disk.available), isShort ? "only " : "");
+  if (!failed) text += fmt::format("; its disk has {}{} free", isShort ? "only " : "", sizeText(disk.available));
   if (isShort && context.warnUser) {
     context.warnUser(text);
   } else if (isShort) {
