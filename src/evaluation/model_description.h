@@ -1,8 +1,10 @@
 #pragma once
 
+#include <optional>
 #include <string>
 #include <vector>
 
+#include "measures/kept_steps.h"
 #include "measures/objective_functions.h"
 #include "measures/output_measure.h"
 #include "parameters/template_file.h"
@@ -27,6 +29,7 @@ struct ModelDescription {
   bool computeExactMeasures = false;  ///< results hold the measures in 64 bits, too
   bool keepSimulatedValues = false;   ///< results hold the simulated values at the observation times
   SeriesPrecision keptPrecision = SeriesPrecision::single;
+  std::optional<KeptSteps> keptSteps = {};  ///< they are kept at simulated steps, too
 };
 
 }  // namespace mirevo

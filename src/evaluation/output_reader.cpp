@@ -79,6 +79,9 @@ OutputReader::OutputReader(const ModelDescription& description, const ObjectiveA
     observedSeries_.push_back(
         readObservedSeries(i, measure, description.period, description.keptPrecision, series_.observation(i)));
   }
+  if (description.keptSteps) {
+    addSimulatedSteps(*description.keptSteps, description.measures, description.period, observedSeries_);
+  }
 }
 
 RunComparison OutputReader::runComparison() const {

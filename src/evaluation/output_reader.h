@@ -53,7 +53,8 @@ class OutputReader final {
   const std::vector<std::string>& simulationFileNames() const { return series_.simulationFileNames(); }
   /// One per output measure.
   const std::vector<MeasureSource>& sources() const { return sources_; }
-  /// The observations of every measure of interface type 0; empty unless simulated values are kept.
+  /// The observations of every measure of interface type 0, with the steps of its simulated series if values are kept
+  /// there; empty unless simulated values are kept.
   const std::vector<ObservedSeries>& observedSeries() const { return observedSeries_; }
   /// The measures whose simulated series a result may hold, 0-based: one per pair of series that is compared.
   const std::vector<std::size_t>& shownMeasures() const { return shownMeasures_; }

@@ -16,7 +16,7 @@ struct ObservedSeries {
   std::size_t measure = 0;           ///< 0-based index of the output measure
   DateRecord start{};                ///< origin of `days`
   std::vector<double> days;          ///< ascending
-  std::vector<double> values;        ///< one per time
+  std::vector<double> values;        ///< one per time; NaN where there is a simulated step alone, addSimulatedSteps()
   std::vector<double> weights = {};  ///< one per time; empty: each 1
 };
 

@@ -73,6 +73,7 @@ void appendColumns(std::vector<std::vector<double>>& rows, const std::vector<std
 /// were written, if that is known.
 std::optional<ReportedBand> readBand(const std::string& path, std::optional<int> lines, std::string& fault) {
   constexpr int kItems = 4;
+  constexpr int kItemsWithRuns = 5;
   std::string reason;
   const auto file = createTimeSeriesObject(path, reason);
   std::error_code ignored;
@@ -81,8 +82,10 @@ std::optional<ReportedBand> readBand(const std::string& path, std::optional<int>
     return std::nullopt;
   }
   const std::string text = readTextFile(path, reason).value_or(std::string());
-  bool isRead = file && file->open(path) && file->itemCount() == kItems && file->startTime();
-  for (int item = 1; isRead && item <= kItems; ++item) isRead = file->getData(item);
+  bool isRead = file && file->open(path) && file->startTime();
+  const int items = isRead ? file->itemCount() : 0;
+  isRead = items == kItems || items == kItemsWithRuns;
+  for (int item = 1; isRead && item <= items; ++item) isRead = file->getData(item);
   const auto wholeLines = std::count(text.begin(), text.end(), '\n');
   if (!isRead) {
     fault = fileNameOf(path) + " is damaged and left out";
@@ -102,6 +105,12 @@ std::optional<ReportedBand> readBand(const std::string& path, std::optional<int>
   band.lower = column(2);
   band.median = column(3);
   band.upper = column(4);
+  if (items == kItemsWithRuns) band.runs = column(kItemsWithRuns);
+  for (const float runs : band.runs) {
+    const int count = std::isfinite(runs) ? static_cast<int>(runs) : 0;
+    band.mostRuns = std::max(band.mostRuns, count);
+    if (count > 0 && (band.fewestRuns == 0 || count < band.fewestRuns)) band.fewestRuns = count;
+  }
   for (std::size_t i = 0; i < band.seconds.size(); ++i) {
     if (!std::isfinite(band.observed[i]) || !std::isfinite(band.median[i])) continue;
     ++band.observationCount;

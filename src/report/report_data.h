@@ -87,16 +87,19 @@ struct ReportedEvaluations {
   std::vector<std::vector<double>> objectives;
 };
 
-/// The 5 to 95 % band of an uncertainty analysis, one entry per observation.
+/// The 5 to 95 % band of an uncertainty analysis, one entry per time.
 struct ReportedBand {
   std::string measure;
   std::vector<std::int64_t> seconds;
-  std::vector<float> observed;
+  std::vector<float> observed;  ///< NaN where there is none
   std::vector<float> lower;
   std::vector<float> median;
   std::vector<float> upper;
+  std::vector<float> runs;  ///< how many are behind the quantiles of each time; empty where the file does not say it
   std::size_t observationCount = 0;  ///< observations with a simulated value
   std::size_t insideCount = 0;       ///< those inside the band
+  int fewestRuns = 0;                ///< of the times with a band
+  int mostRuns = 0;                  ///< where the file does not say it, the runs that succeeded
 };
 
 /// A parameter without a variance, and why.

@@ -191,15 +191,28 @@ void writeComparisons(JsonWriter& json, const ReportData& data) {
   json.endArray();
 }
 
+void writeGaps(JsonWriter& json, std::string_view name, const TimedValues& drawn, const TimedValues& whole) {
+  json.key(name).beginArray();
+  for (const std::size_t i : gapsOf(drawn, whole)) json.integer(static_cast<std::int64_t>(i));
+  json.endArray();
+}
+
 void writeBands(JsonWriter& json, const ReportData& data) {
   json.key("band").beginArray();
-  for (const ReportedBand& band : data.bands) {
+  for (const ReportedBand& whole : data.bands) {
+    const bool isThinned = whole.seconds.size() > kMostDrawnTimes;
+    const ReportedBand& band = isThinned ? thinned(whole) : whole;
     json.beginObject().member("measure", band.measure);
     writeTimes(json, band.seconds);
     json.key("observed").numbers(band.observed, Digits::drawn).key("p5").numbers(band.lower, Digits::drawn);
     json.key("p50").numbers(band.median, Digits::drawn).key("p95").numbers(band.upper, Digits::drawn);
     json.member("inside", static_cast<double>(band.insideCount) / static_cast<double>(band.observationCount));
-    json.member("n", band.observationCount).endObject();
+    json.member("n", band.observationCount);
+    writeGaps(json, "gaps", {band.seconds, band.median}, {whole.seconds, whole.median});
+    writeGaps(json, "observedGaps", {band.seconds, band.observed}, {whole.seconds, whole.observed});
+    if (!band.runs.empty()) json.key("runs").numbers(band.runs, Digits::drawn);
+    json.member("fewestRuns", band.fewestRuns).member("mostRuns", band.mostRuns).member("thinned", isThinned);
+    json.endObject();
   }
   json.endArray();
 }

@@ -379,6 +379,11 @@ void ReportBuilder::addAnalyses() {
     std::vector<std::string> faults;
     data_.bands = reportedBands(config_, filePrefix_, sources_.record, faults);
     for (const std::string& fault : faults) note(fault + ".");
+    const std::vector<bool>& ok = data_.evaluations.ok;
+    for (ReportedBand& band : data_.bands) {
+      if (band.runs.empty())
+        band.mostRuns = analysed.value_or(static_cast<int>(std::count(ok.begin(), ok.end(), true)));
+    }
   }
   if (task.sensitivity != nullptr) {
     data_.sensitivity = reportedSensitivity(config_, *task.sensitivity, space(), sources_.results.rows, pairsOfRuns());

@@ -1,9 +1,11 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <span>
 #include <vector>
 
+#include "report/report_data.h"
 #include "run/results/series_table.h"
 
 namespace mirevo {
@@ -12,9 +14,23 @@ namespace mirevo {
 /// shorter.
 inline constexpr std::size_t kMostDrawnTimes = 100'000;
 
-/// The series at the times at which one of its columns has its smallest or largest value within a short span, at most
-/// kMostDrawnTimes of them: drawn, it looks like the whole series, peaks included.
+/// The series at the times at which one of its columns has its smallest or largest value within a short span, and at
+/// the ends of gaps, at most kMostDrawnTimes of them: drawn, it looks like the whole series, peaks and gaps included.
+/// Of a column with few values all are there.
 ShownSeries thinned(const ShownSeries& series);
+/// The same for a band; its counts stay those of all times.
+ReportedBand thinned(const ReportedBand& band);
+
+/// A column and its times.
+struct TimedValues {
+  std::span<const std::int64_t> seconds;
+  std::span<const float> values;
+};
+
+/// The places of the values of a `drawn` column before which there is a gap in the `whole` one, over which no line is
+/// drawn: a step between two values longer than one and a half of that which nine tenths of its steps do not exceed. Of
+/// fewer than three values, which do not tell what is usual, all.
+std::vector<std::size_t> gapsOf(const TimedValues& drawn, const TimedValues& whole);
 
 /// Exceedance percentages for the flow duration curve of a thinned series, ascending between 0 and 100.
 std::vector<double> exceedancePercentages();

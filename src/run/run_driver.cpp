@@ -212,6 +212,7 @@ void RunDriver::buildModel() {
     return true;
   };
   runner_ = std::make_unique<ModelRunner>(describeModel(config_), *parameters_, *aggregator_, *launcher_, settings);
+  results_->requireSameTimes(config_, runner_->output().observedSeries());
 }
 
 void RunDriver::logSetup() {

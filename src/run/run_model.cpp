@@ -30,6 +30,7 @@ ModelDescription describeModel(const RunConfig& config) {
   model.computeExactMeasures = config.usesExactMeasures();
   model.keepSimulatedValues = config.keepsSimulatedValues();
   if (config.task) model.keptPrecision = config.task->keptPrecision();
+  if (config.task) model.keptSteps = config.task->keptSteps();
   return model;
 }
 

@@ -74,6 +74,7 @@ std::unique_ptr<SeriesRecorder> openSeries(const RunConfig& config, const Search
   warnOfLastDay(config, output, log);
   run.initialValues = ToModelScale(space, space.initial);
   run.kept = keptSeries(config, output);
+  run.keepsSteps = config.task && config.task->keptSteps();
   auto series = std::make_unique<SeriesRecorder>(path, std::move(run), runTimeClock,
                                                  [&log](std::string_view text) { log.warning(text); });
   if (goesOn) {

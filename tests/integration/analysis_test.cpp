@@ -407,6 +407,31 @@ TEST(Uncertainty, SummaryAndBandAreThoseOfTheSample) {
                                               HasSubstr("\n400 model evaluations, 3 of them failed\n")));
 }
 
+TEST(Uncertainty, ABandOfStepsGoesThroughGapsAndBehindThePeriodAndARestartNeedsTheSameSteps) {
+  const ModelFolder folder;
+  const std::string observed = folder.read("observed.csv");
+  const auto lineOf = [&](const char* day) { return observed.find(day); };
+  folder.write("observed.csv", observed.substr(0, lineOf("2001-02-01")) + "2001-02-03 12:00,5.9\n" +
+                                   observed.substr(lineOf("2001-03-01")));
+  folder.write("model/simulated.csv", observed);
+  const std::string setup = folder.writeSetup({.option = 3, .restart = 1});
+  folder.editSetup("End_Date = 2001-12-31", "End_Date = 2001-11-30");
+  folder.editSetup("Sample_Size", "Band_Times = 'steps'\n    Band_End_Date = 2001-12-31\n    Sample_Size");
+  ASSERT_EQ(runProgram({setup}).exitCode, 0) << folder.read("basin.log");
+  const std::string band = folder.read("basin_Band_1.csv");
+  EXPECT_EQ(occurrences(band, "\n2001-"), 366);
+  EXPECT_EQ(occurrences(band, " 00:00,,"), 28 + 31);
+  EXPECT_EQ(occurrences(band, ",40\n"), 366);
+  EXPECT_THAT(band, AllOf(HasSubstr("\n2001-02-03 12:00,5.9,"), HasSubstr("\n2001-12-31 00:00,,")));
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("% of 307 observations lie between"));
+  folder.write("model/simulated.csv", observed.substr(0, lineOf("2001-12-31")));
+  EXPECT_THAT(runProgram({setup}).error, HasSubstr("Error: Unable to continue the earlier run"));
+  EXPECT_EQ(folder.read("basin_Band_1.csv"), band) << "refused without a change";
+  folder.write("model/simulated.csv", observed);
+  ASSERT_EQ(runProgram({setup}).exitCode, 0);
+  EXPECT_EQ(folder.read("basin_Band_1.csv"), band);
+}
+
 TEST(Uncertainty, TheLogTellsTheDistributionOfEachParameterAndWarnsOfWhatIsHardlyMeant) {
   const ModelFolder folder;
   const std::string setup = folder.writeSetup({.option = 3});

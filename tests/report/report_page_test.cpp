@@ -13,6 +13,7 @@
 namespace mirevo {
 namespace {
 
+using ::testing::ElementsAre;
 using ::testing::HasSubstr;
 using ::testing::Not;
 
@@ -67,6 +68,16 @@ TEST(ReportPage, FillsBothPlacesOnceWhateverTheTitleHolds) {
   EXPECT_THAT(page, HasSubstr(R"("title":"\u003c/title\u003e@REPORT_DATA@ \u0026 \u000a\"x\"")"));
 }
 
+TEST(ReportPage, AGapIsAStepMuchLongerThanTheUsualOne) {
+  const std::vector<float> values = {1, 1, 1, NAN, NAN, 1, 1, NAN};
+  const std::vector<std::int64_t> seconds = {0, 10, 20, 30, 40, 50, 60, 70};
+  EXPECT_THAT(gapsOf({seconds, values}, {seconds, values}), ElementsAre(5));
+  const std::vector<float> often = {1, NAN, 1, NAN, 1, NAN, 1, NAN};  // between finer steps of another column
+  EXPECT_THAT(gapsOf({seconds, often}, {seconds, often}), ElementsAre());
+  EXPECT_THAT(gapsOf({std::span(seconds).first(3), often}, {std::span(seconds).first(3), often}), ElementsAre(0, 2));
+  EXPECT_THAT(gapsOf({std::vector<std::int64_t>{0, 60}, std::vector<float>{1, 1}}, {seconds, values}), ElementsAre(1));
+}
+
 TEST(ReportPage, TimesAreAStepWhereTheyAreRegularAndALongSeriesIsThinnedForDrawingAlone) {
   ReportData data;
   data.series.best = ShownEvaluation{3, 0.5};
@@ -83,11 +94,16 @@ TEST(ReportPage, TimesAreAStepWhereTheyAreRegularAndALongSeriesIsThinnedForDrawi
   EXPECT_THAT(json, HasSubstr(R"("times":[0,86400000,172801000])"));
   EXPECT_THAT(json, Not(HasSubstr("\"step\"")));
 
-  const ShownSeries whole = daily(kMostDrawnTimes + 1);
+  ShownSeries whole = daily(kMostDrawnTimes + 1);
+  for (const std::size_t i : {41, 42, 43}) whole.best[i] = std::nanf("");
+  whole.initial[62] = whole.initial[63] = 3.0F;  // few, and none of them an extreme
   const ShownSeries drawn = thinned(whole);
   EXPECT_LE(drawn.seconds.size(), kMostDrawnTimes);
   EXPECT_TRUE(std::is_sorted(drawn.seconds.begin(), drawn.seconds.end()));
-  EXPECT_EQ(*std::max_element(drawn.best.begin(), drawn.best.end()), 1000.0F);  // its only peak
+  EXPECT_EQ(std::count(drawn.best.begin(), drawn.best.end(), 1000.0F), 1) << "its only peak";
+  const auto gap = std::find_if(drawn.best.begin(), drawn.best.end(), [](float value) { return std::isnan(value); });
+  EXPECT_LT(gap - drawn.best.begin(), 43) << "no line is drawn over it";
+  EXPECT_EQ(std::count(drawn.initial.begin(), drawn.initial.end(), 3.0F), 2);
   const std::vector<double> curve = flowDuration(whole.observed);
   EXPECT_EQ(curve.front(), 99.0);
   EXPECT_EQ(curve[curve.size() / 2], 49.0);

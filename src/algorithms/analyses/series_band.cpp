@@ -22,16 +22,17 @@ std::string cell(double value) {
 }  // namespace
 
 SeriesBand seriesBand(std::span<const double> observed, std::size_t evaluations, const ReadColumns& read) {
-  // A MB at a time; of more than ten thousand evaluations more, as every time costs a walk through all of them.
+  // A MB at a time; of many evaluations or times up to 64, as every time costs a walk through all evaluations.
   constexpr std::size_t kValuesAtOnce = std::size_t{1} << 17;
   constexpr std::size_t kMostWalks = 32;
-  const std::size_t atOnce =
-      std::max(kValuesAtOnce / std::max<std::size_t>(evaluations, 1), observed.size() / kMostWalks + 1);
+  constexpr std::size_t kMostValuesAtOnce = std::size_t{1} << 23;
+  const std::size_t runCount = std::max<std::size_t>(evaluations, 1);
+  const std::size_t ofWalk = std::min(observed.size() / kMostWalks, kMostValuesAtOnce / runCount);
+  const std::size_t atOnce = std::max(kValuesAtOnce / runCount, ofWalk + 1);
   SeriesBand band;
   std::size_t inside = 0;
   std::vector<double> columns;
   std::vector<double> values;
-  std::vector<std::size_t> runs;
   for (std::size_t t = 0; t < observed.size(); ++t) {
     if (t % atOnce == 0) columns = read(t, std::min(atOnce, observed.size() - t));
     values.clear();
@@ -42,17 +43,19 @@ SeriesBand seriesBand(std::span<const double> observed, std::size_t evaluations,
     band.lower.push_back(sortedQuantile(values, 0.05));
     band.median.push_back(sortedQuantile(values, 0.50));
     band.upper.push_back(sortedQuantile(values, 0.95));
+    band.runs.push_back(values.size());
     if (values.empty()) continue;
+    ++band.timeCount;
+    if (std::isnan(observed[t])) continue;
     ++band.observationCount;
-    runs.push_back(values.size());
     if (observed[t] >= band.lower[t] && observed[t] <= band.upper[t]) ++inside;
   }
-  if (!runs.empty()) {
-    const auto [fewest, most] = std::minmax_element(runs.begin(), runs.end());
-    band.fewestRuns = *fewest;
-    band.mostRuns = *most;
-    band.fewerRunsCount = static_cast<std::size_t>(
-        std::count_if(runs.begin(), runs.end(), [most = *most](std::size_t count) { return count < most; }));
+  for (const std::size_t count : band.runs) band.mostRuns = std::max(band.mostRuns, count);
+  band.fewestRuns = band.mostRuns;
+  for (const std::size_t count : band.runs) {
+    if (count == 0 || count == band.mostRuns) continue;
+    band.fewestRuns = std::min(band.fewestRuns, count);
+    ++band.fewerRunsCount;
   }
   band.shareInside = band.observationCount == 0
                          ? std::numeric_limits<double>::quiet_NaN()
@@ -63,20 +66,23 @@ SeriesBand seriesBand(std::span<const double> observed, std::size_t evaluations,
 std::string fewerRunsText(const SeriesBand& band) {
   if (band.fewerRunsCount == 0) return "";
   return fmt::format(
-      "at {} of {} observations the quantiles are of fewer runs than at the others, of {} to {}: runs have "
-      "no value there",
-      band.fewerRunsCount, band.observationCount, band.fewestRuns, band.mostRuns);
+      "at {} of {} {} the quantiles are of fewer runs than at the others, of {} to {}: runs have no value there",
+      band.fewerRunsCount, band.timeCount, band.timeCount == band.observationCount ? "observations" : "times",
+      band.fewestRuns, band.mostRuns);
 }
 
-std::string seriesBandText(std::string_view title, const ObservedSeries& observed, const SeriesBand& band) {
+std::string seriesBandText(std::string_view title, const ObservedSeries& observed, const SeriesBand& band,
+                           bool withRuns) {
   std::string text = fmt::format("# Band of {}\n", columnName(title));
   if (const std::string fewer = fewerRunsText(band); !fewer.empty()) text += fmt::format("# {}\n", fewer);
-  text += "time,observed,5 %,50 %,95 %\n";
+  text += fmt::format("time,observed,5 %,50 %,95 %{}\n", withRuns ? ",runs" : "");
   const std::int64_t origin = secondNumber(observed.start);
   for (std::size_t t = 0; t < observed.days.size(); ++t) {
     const DateRecord time = dateOfSecond(secondAfter(origin, observed.days[t]));
-    text += fmt::format("{},{},{},{},{}\n", formatDate(time), cell(observed.values[t]), cell(band.lower[t]),
-                        cell(band.median[t]), cell(band.upper[t]));
+    const std::string value = std::isnan(observed.values[t]) ? std::string() : cell(observed.values[t]);
+    text += fmt::format("{},{},{},{},{}", formatDate(time), value, cell(band.lower[t]), cell(band.median[t]),
+                        cell(band.upper[t]));
+    text += withRuns ? fmt::format(",{}\n", band.runs[t]) : "\n";
   }
   return text;
 }

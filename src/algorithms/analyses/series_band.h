@@ -11,29 +11,33 @@
 
 namespace mirevo {
 
-/// The 5-95 % band of a simulated series at the times of its observations.
+/// The 5-95 % band of a simulated series at the times of its observations, and at others without an observed value.
 struct SeriesBand {
-  std::vector<double> lower;         ///< 5 % quantile (type 7), one per observation; NaN without a simulated value
+  std::vector<double> lower;         ///< 5 % quantile (type 7), one per time; NaN without a simulated value
   std::vector<double> median;        ///< 50 % quantile
   std::vector<double> upper;         ///< 95 % quantile
-  std::size_t observationCount = 0;  ///< observations that have a band
-  std::size_t fewestRuns = 0;        ///< least number of values behind the quantiles of an observation that has a band
+  std::vector<std::size_t> runs;     ///< how many values are behind the quantiles of a time
+  std::size_t timeCount = 0;         ///< times that have a band
+  std::size_t observationCount = 0;  ///< those of them with an observed value
+  std::size_t fewestRuns = 0;        ///< least number of values behind the quantiles of a time that has a band
   std::size_t mostRuns = 0;          ///< largest
-  std::size_t fewerRunsCount = 0;    ///< observations with fewer than the largest number
-  double shareInside = 0.0;          ///< share of those inside the band, limits included; NaN when there are none
+  std::size_t fewerRunsCount = 0;    ///< times with fewer than the largest number
+  double shareInside = 0.0;          ///< share of observations inside the band, limits included; NaN if there are none
 };
 
-/// The simulated values of all successful evaluations at `count` observations of a series from index `first` on; those
-/// at the same observation side by side.
+/// The simulated values of all successful evaluations at `count` times of a series from index `first` on; those at the
+/// same time side by side.
 using ReadColumns = std::function<std::vector<double>(std::size_t first, std::size_t count)>;
 
-/// The band over `evaluations` successful ones; `observed` holds the observations. Asks for the values of a few
-/// observations at a time. Values that are not finite are left out.
+/// The band over `evaluations` successful ones; `observed` has a value per time, NaN where there is none. Asks for the
+/// values of a few times at a time. Values that are not finite are left out.
 SeriesBand seriesBand(std::span<const double> observed, std::size_t evaluations, const ReadColumns& read);
 
 /// "its quantiles are of 3 to 20 runs ..."; empty where all are of equally many.
 std::string fewerRunsText(const SeriesBand& band);
-/// The band as a time-series file: the columns time, observed, 5 %, 50 % and 95 %, one row per observation.
-std::string seriesBandText(std::string_view title, const ObservedSeries& observed, const SeriesBand& band);
+/// The band as a time-series file: the columns time, observed, 5 %, 50 % and 95 %, one row per time, and `withRuns` the
+/// number of runs.
+std::string seriesBandText(std::string_view title, const ObservedSeries& observed, const SeriesBand& band,
+                           bool withRuns = false);
 
 }  // namespace mirevo

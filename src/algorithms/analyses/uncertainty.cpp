@@ -10,6 +10,7 @@
 #include "algorithms/numbers/uniform_generator.h"
 #include "common/fatal_error.h"
 #include "common/run_files.h"
+#include "common/text.h"
 
 namespace mirevo {
 
@@ -85,7 +86,22 @@ const SettingSection<UncertaintySection>& uncertaintySection() {
              .defaultValue = "0",
              .meaning =
                  "1: sets that violate a constraint, or for which an equation has no finite value, are drawn again "
-                 "until all sets can be run. 0: they are not run and count as failed."})}}};
+                 "until all sets can be run. 0: they are not run and count as failed."}),
+        choice<UncertaintySection>(
+            [](UncertaintySection& s, const SetupValue& value) {
+              const bool isSteps = equalIgnoringCase(std::get<std::string>(value), kBandTimesNames[1].name);
+              s.settings.bandTimes = isSteps ? BandTimes::steps : BandTimes::observations;
+            },
+            {.name = kBandTimesKeyword,
+             .defaultValue = "'observations'",
+             .codes = kBandTimesNames,
+             .meaning = "At which times the bands are made: those of the observations, or also every simulated step."}),
+        setting<UncertaintySection>(
+            [](UncertaintySection& s) -> DateRecord& { return s.settings.bandEnd.emplace(); },
+            {.name = kBandEndKeyword,
+             .defaultValue = kNoDefault,
+             .meaning = "With `Band_Times = 'steps'`, the end of the steps, inclusive, if it is later than `End_Date` "
+                        "of the evaluation period."})}}};
   return section;
 }
 

@@ -2,6 +2,7 @@
 
 #include <cstdint>
 #include <functional>
+#include <optional>
 #include <span>
 #include <string>
 #include <string_view>
@@ -10,6 +11,7 @@
 #include "algorithms/numbers/sample_summary.h"
 #include "algorithms/numbers/special_functions.h"
 #include "common/data_table.h"
+#include "common/date_record.h"
 #include "common/parameter_set.h"
 #include "common/settings/keyword_row.h"
 #include "evaluation/evaluator.h"
@@ -27,14 +29,22 @@ struct NormalDistribution {
 enum class SamplingType : std::int32_t { simpleRandom = 0, latinHypercube = 1 };
 inline constexpr CodeName kSamplingTypeNames[] = {{0, "simple random"}, {1, "Latin hypercube"}};
 
+/// At which times the bands of simulated series are made. Without codes: names only, in the order of the enumerators.
+enum class BandTimes : std::int32_t { observations, steps };
+inline constexpr CodeName kBandTimesNames[] = {{std::nullopt, "observations"}, {std::nullopt, "steps"}};
+
 struct UncertaintySettings {
   SamplingType samplingType = SamplingType::simpleRandom;
   std::int32_t sampleSize = 0;                 ///< N, at least 2
   std::vector<NormalDistribution> parameters;  ///< one per variable parameter, in setup order
   bool redrawsInfeasible = false;              ///< whether sets that cannot be run are drawn again
+  BandTimes bandTimes = BandTimes::observations;
+  std::optional<DateRecord> bandEnd;  ///< of the steps; empty: that of the evaluation period
 };
 
 inline constexpr std::string_view kSampleSizeKeyword = "Sample_Size";
+inline constexpr std::string_view kBandTimesKeyword = "Band_Times";
+inline constexpr std::string_view kBandEndKeyword = "Band_End_Date";
 inline constexpr std::string_view kSampleSizeRefusal = "Error: Sample size in uncertainty estimation invalid";
 
 /// The section UNCERTAINTY_ESTIMATION, and the seed of the run, which the initial sample sets, too.

@@ -138,6 +138,12 @@ export interface Band extends Times {
   p95: Maybe[];
   inside: Maybe; // share of the observed values within p5 to p95
   n: Maybe;
+  gaps?: number[]; // places before which there is a gap, over which no line is drawn
+  observedGaps?: number[];
+  runs?: Maybe[]; // how many are behind the quantiles of each time
+  fewestRuns?: number;
+  mostRuns?: number; // without `runs`: the runs that succeeded
+  thinned?: boolean; // reduced to the extremes of short spans; `inside` and `n` are of all values
 }
 
 export interface Covariance {

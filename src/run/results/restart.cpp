@@ -33,6 +33,14 @@ constexpr double kSettingsSeconds = 1.0;  ///< between looks whether their file 
   fatalError(kRefusal, fmt::format("{}\n{}", detail, kRemedy));
 }
 
+}  // namespace
+
+void refuseToGoOn(std::string_view detail) {
+  refuse(detail);
+}
+
+namespace {
+
 /// Because of a file, which may be none of a run's: then a fresh start would be refused, too.
 [[noreturn]] void refuse(std::string_view detail, const std::string& path, const RunFile& file) {
   const std::string why = whyNotReplaceable(path, file);

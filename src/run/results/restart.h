@@ -7,6 +7,7 @@
 #include <optional>
 #include <span>
 #include <string>
+#include <string_view>
 #include <utility>
 #include <vector>
 
@@ -34,6 +35,9 @@ struct RestartFiles {
 
 /// The paths of these files; `filePrefix` is folder and name of the setup.
 RestartFiles restartFiles(const std::string& filePrefix, const ResultFileNames& names);
+
+/// Throws FatalError: the earlier run cannot be continued, for this reason.
+[[noreturn]] void refuseToGoOn(std::string_view detail);
 
 /// An earlier run that is to be continued.
 struct EarlierRun {

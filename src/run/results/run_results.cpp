@@ -16,6 +16,7 @@
 #include "common/text.h"
 #include "common/version.h"
 #include "evaluation/run_comparison.h"
+#include "measures/kept_steps.h"
 #include "run/results/record_file.h"
 #include "run/results/run_record.h"
 #include "run/results/shared_files.h"
@@ -73,16 +74,29 @@ std::vector<EarlierSearch> RunResults::earlierSearches() const {
   return earlierRun_ ? earlierRun_->searches : std::vector<EarlierSearch>{};
 }
 
+void RunResults::makeValuesFile(const RunConfig& config, std::span<const ObservedSeries> observed) {
+  if (!config.keepsSimulatedValues() && !config.usesExactMeasures()) return;
+  const SeriesPrecision precision = config.task->keptPrecision();
+  simulatedValues_.emplace(files_.simulatedValues, simulatedValueCount(observed, precision), precision,
+                           config.usesExactMeasures() ? config.measures.size() : 0, config.task->readsSimulatedValues(),
+                           config.task->keptSteps() ? std::optional(checksumOfTimes(observed)) : std::nullopt);
+}
+
+void RunResults::requireSameTimes(const RunConfig& config, std::span<const ObservedSeries> observed) {
+  if (!earlierRun_) return;
+  makeValuesFile(config, observed);
+  if (!simulatedValues_ || !simulatedValues_->hasOtherTimes()) return;
+  refuseToGoOn(
+      fmt::format("{} has the values at other times: the steps of the simulated files in the model's folder, or "
+                  "the observations, have changed",
+                  files_.simulatedValues));
+}
+
 void RunResults::open(const RunConfig& config, std::span<const ObservedSeries> observed,
                       const ObjectiveAggregator& aggregator, RunLog& log) {
   if (!config.task) return;
   lockFailedRuns(log);
-  if (config.keepsSimulatedValues() || config.usesExactMeasures()) {
-    const SeriesPrecision precision = config.task->keptPrecision();
-    simulatedValues_.emplace(files_.simulatedValues, simulatedValueCount(observed, precision), precision,
-                             config.usesExactMeasures() ? config.measures.size() : 0,
-                             config.task->readsSimulatedValues());
-  }
+  makeValuesFile(config, observed);
   if (earlierRun_) {
     goOn(config, aggregator, log);
   } else {

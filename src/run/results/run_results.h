@@ -39,6 +39,8 @@ class RunResults final {
   /// `sources`: of all measures, for the account of the run.
   void setSources(std::span<const MeasureSource> sources);
 
+  /// Throws FatalError if the earlier run, which this one is to go on from, has kept simulated values at other times.
+  void requireSameTimes(const RunConfig& config, std::span<const ObservedSeries> observed);
   /// Opens the files. Results that the run does not go on from are kept under numbered names. `observed`: the series
   /// whose simulated values are to be kept; empty where the task does not work with them. Says in the log what was
   /// found. Throws FatalError.
@@ -69,6 +71,7 @@ class RunResults final {
  private:
   RunRecord recordOf(const RunConfig& config, const RunLog& log) const;
   void lockFailedRuns(RunLog& log);
+  void makeValuesFile(const RunConfig& config, std::span<const ObservedSeries> observed);
   void warnOfLostRows(RunLog& log) const;
   void startAfresh(const RunConfig& config, RunLog& log);
   void keepEarlierFiles(const RunConfig& config, RunLog& log) const;

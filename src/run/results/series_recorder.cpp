@@ -103,7 +103,7 @@ void SeriesRecorder::evaluationPassed(const EvaluationResult& result, std::span<
 std::optional<SeriesRecorder::Held> SeriesRecorder::heldOfKept(const EvaluationResult& result,
                                                                std::span<const double> values) const {
   if (run_.kept.empty() || result.simulatedValues.empty()) return std::nullopt;
-  Held held{{result.number, result.aggregate}, {values.begin(), values.end()}, {}, true};
+  Held held{{result.number, result.aggregate}, {values.begin(), values.end()}, {}, !run_.keepsSteps};
   for (const KeptSeries& kept : run_.kept) {
     PeriodSeries& series = held.series.emplace_back();
     for (std::size_t i = 0; i < kept.seconds.size(); ++i) {

@@ -35,6 +35,7 @@ struct RecordedSeries {
   double largestGap = kAnyGap;        ///< days between two simulated steps over which is interpolated
   std::vector<double> initialValues;  ///< initial values of the variable parameters, model scale
   std::vector<KeptSeries> kept = {};  ///< of the pairs, for a task that keeps the simulated values of all evaluations
+  bool keepsSteps = false;            ///< at the simulated steps, too
 };
 
 /// Keeps `<setup>_Series.dat`: the simulated series of the initial and of the best evaluation so far. The file is

@@ -1,10 +1,14 @@
 #include "run/results/simulated_values_file.h"
 
+#include <algorithm>
 #include <cassert>
+#include <cstddef>
 #include <cstdint>
 #include <cstring>
 #include <string_view>
 #include <utility>
+
+#include <fmt/core.h>
 
 #include "common/checksum.h"
 #include "common/fatal_error.h"
@@ -55,15 +59,28 @@ std::uint64_t checksumWithRow(std::string_view content, std::span<const double> 
 }  // namespace
 
 SimulatedValuesFile::SimulatedValuesFile(std::string path, std::size_t valueCount, SeriesPrecision precision,
-                                         std::size_t exactMeasureCount, bool isReadBack)
+                                         std::size_t exactMeasureCount, bool isReadBack,
+                                         std::optional<std::uint64_t> timesChecksum)
     : path_(std::move(path)),
       valueCount_(valueCount),
       precision_(precision),
       exactMeasureCount_(exactMeasureCount),
-      isReadBack_(isReadBack) {}
+      isReadBack_(isReadBack),
+      timesChecksum_(timesChecksum) {}
 
 std::string SimulatedValuesFile::head() const {
-  return headOf(kMarks, precision_, recordedCount());
+  std::string bytes = headOf(kMarks, precision_, recordedCount());
+  if (timesChecksum_) appendBytes(bytes, *timesChecksum_);
+  return bytes;
+}
+
+bool SimulatedValuesFile::hasOtherTimes() const {
+  if (!timesChecksum_) return false;
+  const std::string expected = head();
+  const std::string found = readFileIfThere(path_, expected.size()).value_or("");
+  const auto mark = static_cast<std::ptrdiff_t>(sizeof(std::uint64_t));
+  return found.size() == expected.size() && found != expected &&
+         std::equal(found.begin(), found.begin() + mark, expected.begin());
 }
 
 void SimulatedValuesFile::create() {
@@ -73,7 +90,13 @@ void SimulatedValuesFile::create() {
 }
 
 void SimulatedValuesFile::add(std::span<const double> parameterValues, const EvaluationResult& result) {
-  assert(result.simulatedValues.size() == valueCount_ && result.exactMeasures.size() == exactMeasureCount_);
+  assert(result.exactMeasures.size() == exactMeasureCount_);
+  if (result.simulatedValues.size() != valueCount_) {
+    fatalError("Error: Unable to write to " + path_,
+               fmt::format("evaluation No. {} has {} simulated values instead of {}: do all processes of the job read "
+                           "the same observations and the same model folder?",
+                           result.number, result.simulatedValues.size(), valueCount_));
+  }
   std::string bytes;
   appendBytes(bytes, static_cast<std::int64_t>(result.number));
   for (const std::vector<double>* const values : {&result.simulatedValues, &result.exactMeasures}) {
@@ -86,6 +109,7 @@ void SimulatedValuesFile::add(std::span<const double> parameterValues, const Eva
 
 /// Replaces a file of an earlier version, whose checksums do not depend on the rows.
 void SimulatedValuesFile::addRowsToChecksums(const std::map<std::int64_t, const ResultRow*>& rows) const {
+  if (timesChecksum_) return;  // earlier versions had no such files
   const std::string earlierHead = headOf(kMarksWithoutRow, precision_, recordedCount());
   if (readFileIfThere(path_, earlierHead.size()) != earlierHead) return;
   const std::string content = readFileIfThere(path_).value_or("");

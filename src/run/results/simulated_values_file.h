@@ -3,6 +3,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <map>
+#include <optional>
 #include <span>
 #include <string>
 #include <vector>
@@ -28,16 +29,21 @@ struct KeptValues {
 class SimulatedValuesFile final {
  public:
   /// `valueCount`: simulated values of one evaluation. `isReadBack`: the task reads them with valuesOf() and columns(),
-  /// so that no one keeps them in memory.
+  /// so that no one keeps them in memory. `timesChecksum`, where the times depend on more than observations: a file of
+  /// other times is none of this run's.
   SimulatedValuesFile(std::string path, std::size_t valueCount, SeriesPrecision precision = SeriesPrecision::single,
-                      std::size_t exactMeasureCount = 0, bool isReadBack = false);
+                      std::size_t exactMeasureCount = 0, bool isReadBack = false,
+                      std::optional<std::uint64_t> timesChecksum = {});
 
+  /// Whether there is a file with values at other times.
+  bool hasOtherTimes() const;
   /// Creates the file, replacing an existing one. Throws FatalError.
   void create();
   /// Continues the file of an interrupted run: appends to its records from now on, and returns what it has of the
   /// successful evaluations among `rows`; the simulated values are left out if they are read back. Records that are
   /// damaged or of other evaluations, perhaps of another run, are passed over, one that is cut off is removed, and so
-  /// are all of a file of another precision. Throws FatalError when the file cannot be read or written.
+  /// are all of a file of another precision or of other times. Throws FatalError when the file cannot be read or
+  /// written.
   std::map<int, KeptValues> takeUp(std::span<const ResultRow> rows);
 
   /// Writes the values of a successful evaluation; `parameterValues` as in its row. Throws FatalError when that fails.
@@ -69,6 +75,7 @@ class SimulatedValuesFile final {
   SeriesPrecision precision_;
   std::size_t exactMeasureCount_;
   bool isReadBack_;
+  std::optional<std::uint64_t> timesChecksum_;
   RecordFile file_;
   std::vector<std::int64_t> offsets_;  ///< of the record of each evaluation, from No. 1 on; 0: none
 };

@@ -77,7 +77,7 @@ class SetupReader final {
     if (config_.task) {
       config_.task->read({target_, config_.parameters, sections_.parameters, config_.constraints,
                           config_.variableParameterCount(),
-                          [this](bool hasInitialSample) { requireScales(hasInitialSample); }});
+                          [this](bool hasInitialSample) { requireScales(hasInitialSample); }, config_.period});
       for (std::size_t i = 0; i < config_.parameters.size(); ++i) {
         config_.parameters[i].givenValues = config_.task->givenValues(i);
       }

@@ -15,6 +15,7 @@
 #include "common/run_files.h"
 #include "common/settings/keyword_row.h"
 #include "evaluation/evaluator.h"
+#include "measures/kept_steps.h"
 #include "measures/objective_functions.h"
 #include "measures/observed_series.h"
 #include "measures/output_measure.h"
@@ -44,6 +45,7 @@ struct TaskReading {
   std::size_t variableCount = 0;
   /// Refuses an aggregation method whose scales are neither given in the setup nor determined from an initial sample.
   std::function<void(bool hasInitialSample)> requireScales;
+  EvaluationPeriod period = {};
 };
 
 /// What was expected instead of so many sets of n parameters, all of which are in memory; empty if they fit into it.
@@ -144,6 +146,8 @@ class Task {
   virtual bool keepsSimulatedValues() const { return false; }
   /// Whether it reads them from disk when all evaluations have ended; results then do not hold them.
   virtual bool readsSimulatedValues() const { return false; }
+  /// Whether it uses them at the simulated steps, too.
+  virtual std::optional<KeptSteps> keptSteps() const { return std::nullopt; }
   virtual SeriesPrecision keptPrecision() const { return SeriesPrecision::single; }
   /// Whether it uses the output measures in 64 bits, which the results then must hold.
   virtual bool usesExactMeasures() const { return false; }

@@ -19,6 +19,7 @@ class UncertaintyTask final : public Task {
   bool drawsRandomNumbers() const override { return true; }
   bool keepsSimulatedValues() const override { return true; }
   bool readsSimulatedValues() const override { return true; }
+  std::optional<KeptSteps> keptSteps() const override;
   void requireSets(const SearchSpace& space, const Feasibility& feasibility) const override;
   TaskOutcome run(const TaskContext& context) override;
   std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const override;
@@ -27,6 +28,9 @@ class UncertaintyTask final : public Task {
   UncertaintySettings settings;
 
  private:
+  TaskOutcome outcomeOf(const TaskContext& context, const UncertaintyOutcome& found) const;
+  void logBandTimes(const TaskContext& context) const;
+  void logRoom(const TaskContext& context) const;
   std::vector<ParameterSet> drawSample(const TaskContext& context, std::string& acceptance) const;
 };
 

@@ -84,6 +84,14 @@ TEST(SeriesBand, HasTheQuantilesOfWhatSucceededAndCountsTheObservationsInside) {
             "value there");
   EXPECT_EQ(fewerRunsText(seriesBand(std::vector{5.0}, 101, read)), "");
   EXPECT_EQ(band.shareInside, 0.75);
+  const std::vector<double> values = {5.0, 4.9, NAN, 1.0, NAN};
+  const SeriesBand ofSteps = seriesBand(values, 101, read);
+  EXPECT_EQ(ofSteps.observationCount, 2U);
+  EXPECT_EQ(ofSteps.shareInside, 0.5);
+  EXPECT_THAT(fewerRunsText(ofSteps), StartsWith("at 1 of 4 times the quantiles are of fewer runs"));
+  EXPECT_THAT(seriesBandText("flow", {0, {2001, 1, 1}, {0.0, 1.0, 1.5, 2.0, 3.0}, values}, ofSteps, true),
+              EndsWith("\n2001-01-02 12:00,,5.95,50.5,95.05,100\n2001-01-03 00:00,1,NaN,NaN,NaN,0\n"
+                       "2001-01-04 00:00,,-95,-50,-5,101\n"));
   EXPECT_TRUE(std::isnan(seriesBand(std::vector{1.0}, 0, [](auto...) { return std::vector<double>(); }).shareInside));
 }
 

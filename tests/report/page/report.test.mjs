@@ -149,6 +149,21 @@ test('20 000 evaluations and 20 years of days are drawn thinned and counted in f
   });
 });
 
+test('a band breaks at its gaps, shows every observed value and says of how many runs it is, without words of a search', async () => {
+  const data = sample.dataOf('uncertainty');
+  const [band] = data.band;
+  Object.assign(band, { gaps: [100], observedGaps: [200, 201], fewestRuns: 7, mostRuns: 9, runs: band.p5.map(() => 9) });
+  await withReport(data, {}, async (page) => {
+    const [, median, line, dots] = await page.evaluate(() => window.drawnOptions(document.querySelector('#band figure')).series.map(({ data }) => data));
+    assert.deepEqual(median.flatMap(([, value], place) => (value === null ? [place] : [])), [100]);
+    assert.equal(line.filter(([, value]) => value === null).length, 2);
+    assert.deepEqual(dots, [line[201]], 'the value between two gaps');
+    const shown = await page.locator('#report').textContent();
+    assert.ok(shown.includes('The quantiles are of 7 to 9 runs.'));
+    assert.ok(!/best so far|Progress|A wider bound/.test(shown));
+  });
+});
+
 test('data of another format are refused in words', async () => {
   const { page } = await browser.openReport({ ...sample.empty(), format: 2 });
   assert.match(await page.locator('.broken').textContent(), /format 2; this page reads format 1/);

@@ -54,7 +54,8 @@ function findings(data: ReportData): Finding[] {
     const first = data.sensitivity.ranking.slice(0, 3).map(named).join(', ');
     found.push({ kind: 'plain', text: `Most sensitive: ${first}.` });
   }
-  const near = data.parameters.filter((parameter) => parameter.nearBound);
+  // Only a search would have gone on behind a bound.
+  const near = run.task === 'optimisation' ? data.parameters.filter((parameter) => parameter.nearBound) : [];
   if (near.length > 0) {
     const names = near.slice(0, 6).map((parameter) => `${named(parameter.name)} (${parameter.nearBound})`).join(', ');
     const rest = near.length > 6 ? ` and ${near.length - 6} more` : '';

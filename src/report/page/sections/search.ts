@@ -27,6 +27,9 @@ export function judgements(data: ReportData): Judgement[] {
   return all.filter(({ values }) => finite(values).length > 0);
 }
 
+/** Whether evaluations follow one another for the better; those of other tasks have no order. */
+const isSearch = (data: ReportData) => data.run.task === 'optimisation';
+
 const positive = (value: Maybe) => (value !== null && value > 0 ? value : null);
 
 function progressPlan(data: ReportData): ChartPlan {
@@ -36,8 +39,9 @@ function progressPlan(data: ReportData): ChartPlan {
   const top = axisTop(aggregate);
   const above = finite(aggregate).filter((value) => value > top).length;
   const logable = finite(aggregate).every((value) => value > 0);
+  const searches = isSearch(data);
   return {
-    title: 'Aggregate of every evaluation, and the best so far',
+    title: `Aggregate of every evaluation${searches ? ', and the best so far' : ''}`,
     height: 380,
     zoom: 'xy',
     switches: [
@@ -60,17 +64,17 @@ function progressPlan(data: ReportData): ChartPlan {
         series: [
           { name: 'evaluation', type: 'scatter', data: pairs(aggregate), symbolSize: dotSize(numbers.length), large: true, largeThreshold: 3000,
             clip: true, itemStyle: { color: look.dots, opacity: 0.75 } },
-          { name: 'best so far', type: 'line', step: 'end', data: steps, symbol: 'none', clip: true,
-            lineStyle: { color: look.best, width: 2.5 }, itemStyle: { color: look.best } },
+          ...(searches ? [{ name: 'best so far', type: 'line', step: 'end', data: steps, symbol: 'none', clip: true,
+            lineStyle: { color: look.best, width: 2.5 }, itemStyle: { color: look.best } }] : []),
           ...(failed.length > 0 ? [{ name: 'failed', type: 'scatter', yAxisIndex: 1, data: failed.map((value) => [value, 0.012]),
             symbol: 'triangle', symbolSize: 7, large: true, largeThreshold: 3000, itemStyle: { color: look.failed } }] : []),
         ],
       };
     },
     values: () => ({
-      columns: [{ title: 'Evaluation' }, { title: 'Aggregate', number: true }, { title: 'Best so far', number: true }],
+      columns: [{ title: 'Evaluation' }, { title: 'Aggregate', number: true }, ...(searches ? [{ title: 'Best so far', number: true }] : [])],
       length: numbers.length,
-      row: (place) => [count(numbers[place]!), ok[place] === 0 ? 'failed' : number(aggregate[place], 6), number(best[place], 6)],
+      row: (place) => [count(numbers[place]!), ok[place] === 0 ? 'failed' : number(aggregate[place], 6), ...(searches ? [number(best[place], 6)] : [])],
     }),
   };
 }
@@ -236,7 +240,7 @@ export function progressSection(data: ReportData): Section | null {
   const charts: Node[] = [chart(progressPlan(data))];
   const size = data.run.populationSize;
   if (size !== null && size > 1 && data.evaluations.count >= 2 * size) charts.push(chart(spreadPlan(data, size)));
-  return { id: 'progress', title: 'Progress', content: charts };
+  return { id: 'progress', title: isSearch(data) ? 'Progress' : 'Evaluations', content: charts };
 }
 
 export function goodSetsSection(data: ReportData): Section | null {

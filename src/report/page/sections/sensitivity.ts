@@ -1,7 +1,7 @@
 // Which parameters the outputs depend on, and how well the observations determine them.
 import { axis, chart, tip, tooltip, type ChartPlan } from '../chart';
 import type { Covariance, Maybe, ReportData, Sensitivity } from '../data';
-import { shorten, table } from '../dom';
+import { make, shorten, table } from '../dom';
 import { number, percent } from '../format';
 import { placeBetweenBounds } from '../numbers';
 import { extentOf, heatmap } from './heatmap';
@@ -95,6 +95,14 @@ function correlationContent(covariance: Covariance): Node[] {
   ];
 }
 
+const kAssumptions = [
+  'The set is the one that fits best: a better one elsewhere is not covered.',
+  'The model is linear in the parameters, on the scale of the search, between the limits.',
+  'The errors (residuals times their weights) are normally distributed with mean 0 and one variance, which is estimated from the residuals; the limits are quantiles of Student\u2019s t.',
+  'The errors are independent of one another. Residuals that follow one another make the limits too narrow; the log states their lag-1 correlation and by how much.',
+  'The model, its input and its equations are right, and parameters that are left out or fixed are known exactly. The limits take no account of the bounds.',
+];
+
 function covarianceContent(data: ReportData, covariance: Covariance): Node[] {
   const columns = [{ title: 'Parameter' }, { title: 'Estimate', number: true }, { title: 'Standard deviation', number: true },
     { title: 'Lower limit', number: true }, { title: 'Upper limit', number: true }, { title: 'Deviation / estimate', number: true }];
@@ -105,7 +113,8 @@ function covarianceContent(data: ReportData, covariance: Covariance): Node[] {
   });
   return [
     heading('Confidence limits'),
-    paragraph('They assume that the set is the best one, that the model is linear between the limits, and that residuals are independent. Residuals that follow one another make them too narrow; the log states their lag-1 correlation and by how much.'),
+    paragraph('What the limits assume:'),
+    make('ul', {}, ...kAssumptions.map((text) => make('li', {}, text))),
     table(columns, rows, 'Confidence limits'),
     ...(covariance.leftOut.length > 0 ? [paragraph(`Left out: ${covariance.leftOut.map(({ name, reason }) => `\u2068${shorten(name, 60)}\u2069 (\u2068${reason}\u2069)`).join('; ')}.`)] : []),
     chart(confidencePlan(data, covariance)),

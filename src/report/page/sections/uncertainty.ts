@@ -7,6 +7,7 @@ import { judgements } from './search';
 import { grid, heading, paragraph, type Section } from './section';
 
 const kBandPoints = 1500; // across the chart: more than it has pixels
+const kFewValues = 150; // observed values up to which each has a dot
 
 function histogramPlan(name: string, values: Maybe[], wantsLog = false): ChartPlan {
   const log = wantsLog && finite(values).every((value) => value > 0);
@@ -45,68 +46,104 @@ export interface CustomApi {
   coord: (point: number[]) => number[];
 }
 
-// One closed outline per stretch of values without gaps: along the upper edge and back along the lower.
-function bandOutlines(times: number[], low: Maybe[], high: Maybe[], places: number[]): number[][][] {
-  const outlines: number[][][] = [];
-  let run: number[] = [];
-  const close = () => {
-    if (run.length > 1) outlines.push([...run.map((place) => [times[place]!, high[place]!]), ...run.reverse().map((place) => [times[place]!, low[place]!])]);
-    run = [];
-  };
-  for (const place of places) {
-    if (low[place] == null || high[place] == null) close();
-    else run.push(place);
-  }
-  close();
-  return outlines;
+type Place = number | null; // of a band; null: a gap
+interface Extent {
+  time: number;
+  low: number;
+  high: number;
 }
 
-// The widest extent of the band over each stretch of times that falls on one pixel, so that thinning loses no flood.
-function widest(band: Band, from: number, to: number): { places: number[]; low: Maybe[]; high: Maybe[] } {
-  const length = to - from;
-  const edges = spaced(length, Math.min(length, kBandPoints)).map((index) => index + from);
-  const low: Maybe[] = [];
-  const high: Maybe[] = [];
-  edges.forEach((edge, index) => {
-    let [least, most]: [Maybe, Maybe] = [band.p5[edge] ?? null, band.p95[edge] ?? null];
-    for (let place = edge + 1; place < (edges[index + 1] ?? edge + 1); ++place) {
-      const [below, above] = [band.p5[place] ?? null, band.p95[place] ?? null];
-      if (below !== null && least !== null) least = Math.min(least, below);
-      if (above !== null && most !== null) most = Math.max(most, above);
+// All places with values, and a gap before those that are not to be joined with the last.
+function withGaps(values: Maybe[], gaps: Set<number>): Place[] {
+  return values.flatMap((value, place): Place[] => (value === null ? [] : gaps.has(place) ? [null, place] : [place]));
+}
+
+// The stretches without gaps of the band between two places, as its widest extent over each span of times that falls on
+// one pixel, so that thinning loses no flood and joins nothing over a gap.
+function stretches(band: Band, times: number[], gaps: Set<number>, from: number, to: number): Extent[][] {
+  const edges = new Set(spaced(to - from, Math.min(to - from, kBandPoints)).map((index) => index + from));
+  const found: Extent[][] = [];
+  let stretch: Extent[] = [];
+  let isFirstOfSpan = true;
+  const close = () => {
+    if (stretch.length > 0) found.push(stretch);
+    stretch = [];
+  };
+  for (let place = from; place < to; ++place) {
+    const [low, high] = [band.p5[place] ?? null, band.p95[place] ?? null];
+    if (gaps.has(place) || low === null || high === null) close();
+    if (edges.has(place)) isFirstOfSpan = true;
+    if (low === null || high === null) continue;
+    const extent = stretch[stretch.length - 1];
+    if (isFirstOfSpan || !extent) {
+      stretch.push({ time: times[place]!, low, high });
+    } else {
+      extent.low = Math.min(extent.low, low);
+      extent.high = Math.max(extent.high, high);
     }
-    low[edge] = least;
-    high[edge] = most;
+    isFirstOfSpan = false;
+  }
+  close();
+  return found;
+}
+
+// One closed outline per stretch: along the upper edge and back along the lower. A single time is a line.
+function bandShapes(found: Extent[][], coord: (point: number[]) => number[], color: string): object[] {
+  return found.map((stretch) => {
+    const upper = stretch.map(({ time, high }) => coord([time, high]));
+    const lower = stretch.map(({ time, low }) => coord([time, low]));
+    const [[x1, y1], [x2, y2]] = [upper[0] as [number, number], lower[0] as [number, number]];
+    return stretch.length > 1
+      ? { type: 'polygon', shape: { points: [...upper, ...lower.reverse()] }, style: { fill: color, opacity: 0.45 } }
+      : { type: 'line', shape: { x1, y1, x2, y2 }, style: { stroke: color, lineWidth: 2, opacity: 0.6 } };
   });
-  return { places: edges, low, high };
+}
+
+function runsNote({ runs, fewestRuns, mostRuns }: Band): string {
+  if (!mostRuns) return '';
+  if (!runs) return ` The quantiles are of those of ${count(mostRuns)} runs that have a value at the time.`;
+  return ` The quantiles are of ${fewestRuns === mostRuns ? '' : `${count(fewestRuns ?? 0)} to `}${count(mostRuns)} runs.`;
+}
+
+function coverageNote(band: Band): string {
+  if (band.n === 0) return 'No observed value has a simulated one at its time.';
+  return `${percent(band.inside)} of ${band.n === null ? 'the' : count(band.n)} observed values lie within the band.`;
 }
 
 function bandPlan(band: Band): ChartPlan {
   const times = timesOf(band, band.p5.length);
   const step = times.length > 1 ? times[1]! - times[0]! : 86400000;
   const positive = (value: Maybe | undefined) => (value != null && value > 0 ? value : null);
+  const gaps = new Set(band.gaps ?? []);
+  const median = withGaps(band.p50, gaps);
+  const observed = withGaps(band.observed, new Set(band.observedGaps ?? []));
+  const isGap = (index: number) => (observed[index] ?? null) === null;
+  const alone = observed.filter((_, index) => !isGap(index) && isGap(index - 1) && isGap(index + 1));
+  const few = finite(band.observed).length <= kFewValues;
   return {
     title: 'The 5 to 95 % band of the simulated values, and the observed',
-    note: `${percent(band.inside)} of ${band.n === null ? 'the' : count(band.n)} observed values lie within the band. Drag across the chart to zoom in.`,
+    note: `${coverageNote(band)}${runsNote(band)}${band.thinned ? ' Of so many times the extremes of short spans are drawn.' : ''} Drag across the chart to zoom in.`,
     height: 440,
     zoom: 'x',
     switches: [{ key: 'log', label: 'Log' }],
     option: (look, is) => {
-      const scaled = (values: Maybe[]) => (is('log') ? values.map(positive) : values);
-      const shown = is('log') ? { ...band, p5: scaled(band.p5), p95: scaled(band.p95) } : band;
-      const lines = { type: 'line', symbol: 'none', sampling: 'lttb' };
+      const scaled = (value: Maybe | undefined) => (is('log') ? positive(value) : value ?? null);
+      const shown = is('log') ? { ...band, p5: band.p5.map(positive), p95: band.p95.map(positive) } : band;
+      const points = (places: Place[], values: Maybe[]) => places.map((place, index) =>
+        (place === null ? [times[places[index + 1]!]!, null] : [times[place]!, scaled(values[place])]));
+      const lines = { type: 'line', symbol: 'none', connectNulls: false, sampling: 'lttb' };
       const [first, last] = [times[0]!, times[times.length - 1]!];
       return {
-        dataset: { source: { time: times, p5: scaled(band.p5), p50: scaled(band.p50), p95: scaled(band.p95), observed: scaled(band.observed) },
-          dimensions: ['time', 'p5', 'p50', 'p95', 'observed'] },
         legend: legend(look, { data: ['5 to 95 %', ...lineEntries(['median', 'observed'])], itemWidth: 34 }),
         grid: { left: 64, right: 16, top: 36, bottom: 72 },
         xAxis: [axis(look, { type: 'time', min: first, max: last })],
         yAxis: axis(look, { name: band.unit || 'Value', log: is('log'), nameGap: 48, ...(is('log') ? {} : { scale: false }) }),
         dataZoom: timeZoom(look, [0], 'none', (time) => moment(time, step)),
-        tooltip: tooltip(look, { trigger: 'axis', formatter: (points: { dataIndex: number }[]) => {
-          const place = points[points.length - 1]!.dataIndex;
+        tooltip: tooltip(look, { trigger: 'axis', formatter: (found: { axisValue: number }[]) => {
+          const place = nearest(times, found[0]!.axisValue);
           return tip(moment(times[place]!, step), [['observed', number(band.observed[place])], ['median', number(band.p50[place])],
-            ['5 %', number(band.p5[place])], ['95 %', number(band.p95[place])]]);
+            ['5 %', number(band.p5[place])], ['95 %', number(band.p95[place])],
+            ...(band.runs ? [['runs', count(band.runs[place] ?? 0)] as [string, string]] : [])]);
         } }),
         series: [
           {
@@ -119,23 +156,35 @@ function bandPlan(band: Band): ChartPlan {
               const scale = api.size([1, 0])[0]!;
               const from = Math.max(0, times.findIndex((time) => origin + (time - first) * scale >= info.coordSys.x) - 1);
               const end = times.findIndex((time) => origin + (time - first) * scale > info.coordSys.x + info.coordSys.width);
-              const { places, low, high } = widest(shown, from, end < 0 ? times.length : Math.min(times.length, end + 1));
-              return { type: 'group', children: bandOutlines(times, low, high, places).map((outline) => ({
-                type: 'polygon', shape: { points: outline.map((point) => api.coord(point)) }, style: { fill: look.band, opacity: 0.45 },
-              })) };
+              const found = stretches(shown, times, gaps, from, end < 0 ? times.length : Math.min(times.length, end + 2));
+              return { type: 'group', children: bandShapes(found, api.coord, look.band) };
             },
           },
-          { ...lines, name: 'median', encode: { x: 'time', y: 'p50' }, color: look.best, lineStyle: { color: look.best, width: 1.3 } },
-          { ...lines, name: 'observed', encode: { x: 'time', y: 'observed' }, color: look.observed, lineStyle: { color: look.observed, width: 1.1 }, z: 4 },
+          { ...lines, name: 'median', data: points(median, band.p50), color: look.best, lineStyle: { color: look.best, width: 1.3 } },
+          { ...lines, name: 'observed', data: points(observed, band.observed), color: look.observed, lineStyle: { color: look.observed, width: 1.1 }, z: 4 },
+          // Values without a neighbour have no line, and a line through a few hides where they are.
+          { name: 'observed', type: 'scatter', data: points(few ? observed : alone, band.observed), symbolSize: 5, itemStyle: { color: look.observed }, z: 4 },
         ],
       };
     },
     values: () => ({
-      columns: [{ title: 'Time' }, ...['observed', '5 %', 'median', '95 %'].map((title) => ({ title, number: true }))],
+      columns: [{ title: 'Time' }, ...['observed', '5 %', 'median', '95 %', ...(band.runs ? ['runs'] : [])].map((title) => ({ title, number: true }))],
       length: times.length,
-      row: (place) => [moment(times[place]!, step), ...[band.observed, band.p5, band.p50, band.p95].map((values) => number(values[place]))],
+      row: (place) => [moment(times[place]!, step), ...[band.observed, band.p5, band.p50, band.p95].map((values) => number(values[place])),
+        ...(band.runs ? [count(band.runs[place] ?? 0)] : [])],
     }),
   };
+}
+
+// The place of the time that is closest to one; times are ascending.
+function nearest(times: number[], time: number): number {
+  let [low, high] = [0, times.length - 1];
+  while (high - low > 1) {
+    const middle = (low + high) >> 1;
+    if (times[middle]! <= time) low = middle;
+    else high = middle;
+  }
+  return Math.abs(times[high]! - time) < Math.abs(times[low]! - time) ? high : low;
 }
 
 export function bandSection(data: ReportData): Section | null {
