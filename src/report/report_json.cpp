@@ -7,6 +7,7 @@
 #include "algorithms/numbers/sample_summary.h"
 #include "common/calendar.h"
 #include "measures/fit_figures.h"
+#include "report/hydrograph_views.h"
 #include "report/json_writer.h"
 #include "report/thinning.h"
 
@@ -165,6 +166,7 @@ void writeSeries(JsonWriter& json, const ReportData& data) {
     if (data.series.best) writeFigures(json, "best", fitFigures(series.best, series.observed));
     json.endObject().member("thinned", isThinned);
     if (isThinned) writeFlowDuration(json, series);
+    writeHydrographViews(json, series, dateOfSecond(data.periodFirst)[date_field::kMonth]);
     json.endObject();
   }
   json.endArray();

@@ -6,6 +6,7 @@ import { count, moment, number } from '../format';
 import type { Look } from '../look';
 import { durationCurve, finite, spaced, thin } from '../numbers';
 import { grid, heading, type Section } from './section';
+import { viewsOf } from './views';
 
 const kCurvePoints = 700;
 
@@ -238,6 +239,7 @@ export function seriesSection(data: ReportData): Section | null {
       chart(hydrographPlan(data, series)),
       ...(judgedPlaces(series).length > 0 && simulations(data, series).length > 0
         ? [grid(chart(scatterPlan(data, series)), chart(durationPlan(data, series)))] : []),
+      ...viewsOf(series),
     ]),
   };
 }
