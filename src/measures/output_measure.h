@@ -61,6 +61,7 @@ struct OutputMeasure {
   std::string functionName;    ///< the objective function that it belongs to; empty: none
   SeriesReference simulation;  ///< in or below the base folder
   SeriesReference observation;
+  SeriesReference shownAbove;  ///< drawn above the hydrograph; without a file name: none
 };
 
 /// Values of series in 32 bits, as the statistics of a run use them, or with all digits of their file.

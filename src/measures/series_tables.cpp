@@ -16,6 +16,7 @@
 #include "common/text.h"
 #include "measures/measure_statistics.h"
 #include "measures/observed_series.h"
+#include "measures/shown_above.h"
 #include "measures/statistics.h"
 #include "platform/series/series_reading.h"
 
@@ -140,6 +141,7 @@ SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> mea
     tables.usualSizes_.push_back(sizeOf(tables.simulationNames_[i]));
   }
   tables.checkItems(measures, period, isForRuns);
+  for (const OutputMeasure& measure : measures) requireShownAbove(measure);
   tables.releaseSimulationFiles();
   return tables;
 }

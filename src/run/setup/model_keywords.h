@@ -25,6 +25,7 @@ const SettingSection<RunConfig>& judgementSection();
 const SettingSection<OutputMeasure>& measureSection();
 const SettingSection<SeriesReference>& simulationFileSection();
 const SettingSection<SeriesReference>& observationFileSection();
+const SettingSection<SeriesReference>& shownAboveSection();
 const SettingSection<ObjectiveSection>& objectiveSection();
 const SettingSection<SavedOutputFile>& savedFileSection();
 const SettingSection<RunConfig>& measureFileSection();

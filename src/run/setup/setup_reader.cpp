@@ -290,6 +290,9 @@ void SetupReader::readSeries(const SetupSection& section, OutputMeasure& measure
                        "expected the name of a file");
     }
   }
+  if (const auto above = section.openIfPresent("SHOWN_ABOVE")) {
+    readReference(*above, shownAboveSection(), measure.shownAbove);
+  }
 }
 
 /// Adds to each objective function the measures that name it.
