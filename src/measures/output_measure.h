@@ -67,6 +67,7 @@ struct OutputMeasure {
   ObservationWeighting weighting = {};  ///< of the observations
   ObservationSelection selection = {};
   TimeMatching timeMatch = {};
+  SeriesReference shownAbove = {};  ///< drawn above the hydrograph; without a file name: none
 };
 
 /// Values of series in 32 bits, as the statistics of a run use them, or with all digits of their file.

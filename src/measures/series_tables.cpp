@@ -18,6 +18,7 @@
 #include "measures/dates.h"
 #include "measures/measure_statistics.h"
 #include "measures/observed_series.h"
+#include "measures/shown_above.h"
 #include "measures/statistics.h"
 #include "platform/series/series_reading.h"
 
@@ -156,6 +157,7 @@ SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> mea
     tables.usualSizes_.push_back(sizeOf(tables.simulationNames_[i]));
   }
   tables.checkItems(measures, period, isForRuns);
+  for (const OutputMeasure& measure : measures) requireShownAbove(measure);
   tables.releaseSimulationFiles();
   return tables;
 }

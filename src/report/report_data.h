@@ -9,6 +9,7 @@
 
 #include "evaluation/evaluation_result.h"
 #include "report/failure_reasons.h"
+#include "report/series_above.h"
 #include "run/results/run_record.h"
 #include "run/results/series_table.h"
 
@@ -149,6 +150,7 @@ struct ReportData {
   std::int64_t periodFirst = 0;  ///< secondNumber() of the ends of the evaluation period
   std::int64_t periodLast = 0;
   SeriesTable series;
+  std::vector<std::optional<SeriesAbove>> above;  ///< one per shown series, or none at all
   std::vector<ReportedBand> bands;
   std::optional<ReportedSensitivity> sensitivity;
   std::vector<std::string> summary;  ///< the closing lines of the result file

@@ -7,6 +7,7 @@
 #include "algorithms/numbers/sample_summary.h"
 #include "common/calendar.h"
 #include "measures/fit_figures.h"
+#include "report/hydrograph_views.h"
 #include "report/json_writer.h"
 #include "report/thinning.h"
 
@@ -146,6 +147,12 @@ void writeFlowDuration(JsonWriter& json, const ShownSeries& series) {
   json.key("best").numbers(flowDuration(series.best), Digits::drawn).endObject();
 }
 
+void writeAbove(JsonWriter& json, const SeriesAbove& above) {
+  json.key("above").beginObject().member("name", above.name);
+  writeTimes(json, above.series.seconds);
+  json.key("values").numbers(above.series.values, Digits::drawn).member("thinned", above.isThinned).endObject();
+}
+
 void writeSeries(JsonWriter& json, const ReportData& data) {
   json.key("series").beginArray();
   for (const ShownSeries& series : data.series.series) {
@@ -165,6 +172,9 @@ void writeSeries(JsonWriter& json, const ReportData& data) {
     if (data.series.best) writeFigures(json, "best", fitFigures(series.best, series.observed));
     json.endObject().member("thinned", isThinned);
     if (isThinned) writeFlowDuration(json, series);
+    const auto index = static_cast<std::size_t>(&series - data.series.series.data());
+    if (index < data.above.size() && data.above[index]) writeAbove(json, *data.above[index]);
+    writeHydrographViews(json, series, dateOfSecond(data.periodFirst)[date_field::kMonth]);
     json.endObject();
   }
   json.endArray();

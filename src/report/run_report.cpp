@@ -351,6 +351,9 @@ void ReportBuilder::addSeries() {
       if (read.measure != names[i]) continue;
       series.push_back(std::move(read));
       series.back().measure = pairName(config_.measures, shown[i]);
+      std::string fault;
+      data_.above.push_back(seriesAbove(config_.measures, shown[i], series.back().seconds, fault));
+      if (!fault.empty()) note(fault + ".");
       break;
     }
   }

@@ -1,6 +1,8 @@
 // The data that the program writes into the page. Missing, NaN and infinite numbers are null. What a run does not have
 // is absent or empty: the page shows sections only for what exists.
 
+import type { SeriesAbove, Views } from './views';
+
 export type Maybe = number | null;
 
 export interface Run {
@@ -127,6 +129,8 @@ export interface Series extends Times {
   thinned?: boolean; // reduced to the extremes of short spans; figures and `flowDuration` are computed from all values
   flowDuration?: FlowDuration;
   figures?: { initial?: Figures | null; best?: Figures | null };
+  views?: Views;
+  above?: SeriesAbove;
 }
 
 export interface Band extends Times {

@@ -447,6 +447,24 @@ const SettingSection<OutputMeasure>& observationFileSection() {
   return section;
 }
 
+const SettingSection<SeriesReference>& shownAboveSection() {
+  static const SettingSection<SeriesReference> section{
+      {"ObjectiveFunctions/OUTPUT_MEASURES/MEASURE_n/SHOWN_ABOVE",
+       "for each measure that has it",
+       "A series, such as precipitation, that the report draws above the hydrograph, from the top down. It is not "
+       "compared with anything.",
+       {setting<&SeriesReference::fileName>({.name = "File_Name",
+                                             .type = KeywordType::fileName,
+                                             .defaultValue = "''",
+                                             .meaning = "Its time-series file; blank: none.",
+                                             .bearsOnResults = kNotOfResults}),
+        setting<&SeriesReference::itemNo>({.name = "Item_No",
+                                           .defaultValue = "1",
+                                           .meaning = "Which item of the file, from 1.",
+                                           .bearsOnResults = kNotOfResults})}}};
+  return section;
+}
+
 const SettingSection<ObjectiveSection>& objectiveSection() {
   using Section = ObjectiveSection;
   static const SettingSection<Section> section{

@@ -31,6 +31,7 @@ const SettingSection<RunConfig>& judgementSection();
 const SettingSection<OutputMeasure>& measureSection();
 const SettingSection<OutputMeasure>& simulationFileSection();
 const SettingSection<OutputMeasure>& observationFileSection();
+const SettingSection<SeriesReference>& shownAboveSection();
 const SettingSection<ObjectiveSection>& objectiveSection();
 const SettingSection<SavedOutputFile>& savedFileSection();
 const SettingSection<RunConfig>& measureFileSection();

@@ -127,6 +127,7 @@ const SetupSchema& setupSchema() {
                                         &measureSection().row,
                                         &simulationFileSection().row,
                                         &observationFileSection().row,
+                                        &shownAboveSection().row,
                                         &listSection("ObjectiveFunctions/OBJECTIVE_FUNCTIONS"),
                                         &objectiveSection().row,
                                         &listSection("SAVE_OUTPUT_FILES"),

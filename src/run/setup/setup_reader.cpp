@@ -309,6 +309,10 @@ void SetupReader::readSeries(const SetupSection& section, OutputMeasure& measure
                        "expected the name of a file");
     }
   }
+  if (const auto above = section.openIfPresent("SHOWN_ABOVE")) {
+    above->read(shownAboveSection(), measure.shownAbove);
+    locateReference(*above, measure.shownAbove);
+  }
 }
 
 /// Adds to each objective function the measures that name it.

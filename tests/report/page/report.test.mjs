@@ -110,6 +110,26 @@ test('a chart zooms by dragging and by the wheel, is reset, and changes to a log
   });
 });
 
+test('the views below a hydrograph are made when they are unfolded, and a series is drawn above it', async () => {
+  const data = sample.dataOf('optimisation');
+  const [series] = data.series;
+  series.above = { name: '<b>rain</b>', start: series.start, step: series.step, count: series.count, values: series.best, thinned: false };
+  await withReport(data, {}, async (page) => {
+    const before = await page.locator('#series figure').count();
+    await page.$$eval('#series details.view', (all) => all.forEach((details) => { details.open = true; }));
+    await page.getByText('Autocorrelation of the residuals').waitFor();
+    assert.ok(await page.locator('#series figure').count() >= before + 5);
+    for (const figure of await page.$$('#series figure')) await figure.scrollIntoViewIfNeeded();
+    await page.waitForFunction(() => [...document.querySelectorAll('#series figure')].every((figure) => figure.dataset.drawn));
+    assert.deepEqual(await blankCharts(page), []);
+    assert.equal(await page.locator('#series .view tbody tr').first().locator('td').first().textContent(), String(series.views.seasons[0].n));
+    const canvas = await page.$('#series figure .canvas');
+    await canvas.scrollIntoViewIfNeeded();
+    await canvas.hover({ position: { x: 300, y: 100 } });
+    await page.locator('.tip').getByText('<b>rain</b>').waitFor();
+  });
+});
+
 test('the reader changes what dots are drawn against, and between light and dark', async () => {
   await withReport(sample.dataOf('optimisation'), { colorScheme: 'light' }, async (page) => {
     const ground = () => page.evaluate(() => getComputedStyle(document.body).backgroundColor);

@@ -5,7 +5,9 @@ import { shorten, table } from '../dom';
 import { count, moment, number } from '../format';
 import type { Look } from '../look';
 import { durationCurve, finite, spaced, thin } from '../numbers';
+import { withSeriesAbove } from './above';
 import { grid, heading, type Section } from './section';
+import { viewsOf } from './views';
 
 const kCurvePoints = 700;
 
@@ -235,9 +237,10 @@ export function seriesSection(data: ReportData): Section | null {
     content: shown.flatMap((series) => [
       heading(series.measure),
       figuresTable(data, series),
-      chart(hydrographPlan(data, series)),
+      chart(withSeriesAbove(hydrographPlan(data, series), series)),
       ...(judgedPlaces(series).length > 0 && simulations(data, series).length > 0
         ? [grid(chart(scatterPlan(data, series)), chart(durationPlan(data, series)))] : []),
+      ...viewsOf(series),
     ]),
   };
 }

@@ -1,0 +1,21 @@
+#pragma once
+
+#include <string>
+
+#include "measures/period_series.h"
+
+namespace mirevo {
+
+/// A series that is drawn above a hydrograph.
+struct NamedSeries {
+  std::string name;  ///< of the item in its file
+  PeriodSeries series;
+};
+
+/// Throws FatalError, with the texts for files of observations, if the file or the item cannot be read.
+NamedSeries readShownAbove(const SeriesReference& reference, const EvaluationPeriod& period);
+
+/// Throws FatalError if the series that the measure has drawn above its hydrograph cannot be read. Nothing without one.
+void requireShownAbove(const OutputMeasure& measure);
+
+}  // namespace mirevo

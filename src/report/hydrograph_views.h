@@ -1,0 +1,12 @@
+#pragma once
+
+#include "report/json_writer.h"
+#include "run/results/series_table.h"
+
+namespace mirevo {
+
+/// Writes the member "views": what the report tells of a pair of series beside its hydrograph, all of it computed from
+/// all pairs of an observed and a simulated value. None without pairs. `firstMonth` (1 to 12) begins the years.
+void writeHydrographViews(JsonWriter& json, const ShownSeries& series, int firstMonth);
+
+}  // namespace mirevo
