@@ -1,7 +1,8 @@
 // Builds the page from the data that the program wrote into it.
-import { drawInTime, drawnOptions } from './chart';
+import { drawingOf, drawInTime, drawnOptions } from './chart';
 import { readReportData, type ReportData } from './data';
 import { make } from './dom';
+import { nameFilesAfter } from './figure_files';
 import { switchTheme } from './look';
 import { failureSection, head, parameterSection, resultSection, runSection, summarySection } from './sections/overview';
 import { dottySection, goodSetsSection, progressSection } from './sections/search';
@@ -42,6 +43,7 @@ function contents(shown: Section[]): HTMLElement {
 
 function build(place: HTMLElement): void {
   const data = readReportData(document.getElementById('report-data')!.textContent!);
+  nameFilesAfter(data.run.setupName);
   const shown = sections(data);
   place.append(
     contents(shown),
@@ -56,7 +58,7 @@ try {
   drawInTime(() => {
     document.documentElement.dataset.drawn = String(Math.round(performance.now()));
   });
-  Object.assign(window, { drawnOptions });
+  Object.assign(window, { drawingOf, drawnOptions });
 } catch (error) {
   place.append(make('p', { class: 'broken', role: 'alert' }, `This report cannot be shown: ${error instanceof Error ? error.message : String(error)}`));
   throw error;

@@ -102,6 +102,11 @@ function dottyPlan(data: ReportData, parameter: Parameter, column: Maybe[], judg
         ],
       };
     },
+    csv: () => ({
+      columns: [{ title: 'Evaluation' }, { title: parameter.name }, { title: judgement().name }],
+      length: column.length,
+      row: (place) => [count(data.evaluations.numbers[place]!), number(column[place]), number(judgement().values[place])],
+    }),
   };
 }
 
@@ -173,6 +178,11 @@ function parallelPlan(data: ReportData, good: number[]): ChartPlan {
           emphasis: { lineStyle: { width: 2.5, opacity: 1 } } },
         { type: 'parallel', data: values.slice(-1), z: 5, silent: true, lineStyle: { width: 3, opacity: 1, color: look.ink } },
       ],
+    }),
+    csv: () => ({
+      columns: ['Evaluation', ...variable.map(({ name }) => name), 'Aggregate'].map((title) => ({ title })),
+      length: good.length,
+      row: (rank) => [count(numbers[good[rank]!]!), ...variable.map((_, index) => number(parameters[index]?.[good[rank]!])), number(aggregate[good[rank]!])],
     }),
   };
 }

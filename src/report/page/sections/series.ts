@@ -60,6 +60,7 @@ function hydrographPlan(data: ReportData, series: Series): ChartPlan {
     note: `Residual: ${judged ? shorten(judged.name, 60) : 'simulated'} less observed.${outside(times, series.period).length > 0 ? ' Shaded: outside the evaluation period.' : ''} ${series.thinned ? ' Of so many times the extremes of short spans are drawn.' : ''} Drag across the chart to zoom in, move the slider below to go along.`,
     height: 492,
     zoom: 'x',
+    thinned: series.thinned,
     switches: [{ key: 'log', label: 'Log' }],
     option: (look, is) => {
       const style = lineStyles(look);
@@ -102,8 +103,7 @@ function hydrographPlan(data: ReportData, series: Series): ChartPlan {
       };
     },
     values: () => ({
-      columns: [{ title: 'Time' }, { title: 'observed', number: true }, ...simulated.map(({ name }) => ({ title: name, number: true })),
-        { title: 'residual', number: true }],
+      columns: [{ title: 'Time' }, ...['observed', ...simulated.map(({ name }) => name), 'residual'].map((title) => ({ title, number: true, unit: series.unit }))],
       length: times.length,
       row: (place) => [moment(times[place]!, step), number(series.observed[place]), ...simulated.map(({ values }) => number(values[place])),
         number(residuals?.[place])],
@@ -127,6 +127,7 @@ function scatterPlan(data: ReportData, series: Series): ChartPlan {
     title: 'Simulated against observed',
     height: 340,
     small: true,
+    thinned: series.thinned,
     zoom: 'xy',
     switches: [{ key: 'log', label: 'Log' }],
     option: (look, is) => {
@@ -197,7 +198,7 @@ function durationPlan(data: ReportData, series: Series): ChartPlan {
       })),
     }),
     values: () => ({
-      columns: [{ title: 'Time exceeded (%)', number: true }, ...curves.map(({ name }) => ({ title: name, number: true }))],
+      columns: [{ title: 'Time exceeded (%)', number: true }, ...curves.map(({ name }) => ({ title: name, number: true, unit: series.unit }))],
       length: Math.max(...curves.map(({ points }) => points.length)),
       row: (index) => [number(curves[curves.length - 1]!.points[index]?.[0]), ...curves.map(({ points }) => number(points[index]?.[1]))],
     }),

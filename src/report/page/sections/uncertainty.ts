@@ -131,7 +131,7 @@ function bandPlan(band: Band): ChartPlan {
       };
     },
     values: () => ({
-      columns: [{ title: 'Time' }, ...['observed', '5 %', 'median', '95 %'].map((title) => ({ title, number: true }))],
+      columns: [{ title: 'Time' }, ...['observed', '5 %', 'median', '95 %'].map((title) => ({ title, number: true, unit: band.unit }))],
       length: times.length,
       row: (place) => [moment(times[place]!, step), ...[band.observed, band.p5, band.p50, band.p95].map((values) => number(values[place]))],
     }),
