@@ -150,8 +150,9 @@ void writeSeries(JsonWriter& json, const ReportData& data) {
   json.key("series").beginArray();
   for (const ShownSeries& series : data.series.series) {
     json.beginObject().member("measure", series.measure).key("unit").null();
-    const bool isThinned = series.seconds.size() > kMostDrawnTimes;
-    const ShownSeries& drawn = isThinned ? thinned(series) : series;
+    const std::size_t most = mostDrawnTimes(data.series.series.size());
+    const bool isThinned = series.seconds.size() > most;
+    const ShownSeries& drawn = isThinned ? thinned(series, most) : series;
     writeTimes(json, drawn.seconds);
     json.key("observed").numbers(drawn.observed, Digits::drawn);
     if (data.series.initial) json.key("initial").numbers(drawn.initial, Digits::drawn);

@@ -9,6 +9,8 @@ namespace {
 
 constexpr std::size_t kColumns = 3;
 constexpr std::size_t kDurationPoints = 1000;
+constexpr std::size_t kMostDrawnTimesOfAll = 600'000;
+constexpr std::size_t kFewestDrawnTimes = 6'000;
 
 /// Adds the places of the smallest and the largest finite value among those from `begin` to `end`.
 void addExtremes(const std::vector<float>& values, std::size_t begin, std::size_t end,
@@ -27,8 +29,12 @@ void addExtremes(const std::vector<float>& values, std::size_t begin, std::size_
 
 }  // namespace
 
-ShownSeries thinned(const ShownSeries& series) {
-  const std::size_t spans = kMostDrawnTimes / (2 * kColumns);
+std::size_t mostDrawnTimes(std::size_t count) {
+  return std::clamp(kMostDrawnTimesOfAll / std::max<std::size_t>(count, 1), kFewestDrawnTimes, kMostDrawnTimes);
+}
+
+ShownSeries thinned(const ShownSeries& series, std::size_t most) {
+  const std::size_t spans = most / (2 * kColumns);
   const std::size_t count = series.seconds.size();
   ShownSeries drawn;
   drawn.measure = series.measure;

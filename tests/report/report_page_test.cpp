@@ -88,6 +88,9 @@ TEST(ReportPage, TimesAreAStepWhereTheyAreRegularAndALongSeriesIsThinnedForDrawi
   EXPECT_LE(drawn.seconds.size(), kMostDrawnTimes);
   EXPECT_TRUE(std::is_sorted(drawn.seconds.begin(), drawn.seconds.end()));
   EXPECT_EQ(*std::max_element(drawn.best.begin(), drawn.best.end()), 1000.0F);  // its only peak
+  const ShownSeries ofMany = thinned(whole, mostDrawnTimes(50));
+  EXPECT_LE(ofMany.seconds.size(), kMostDrawnTimes / 8);
+  EXPECT_EQ(*std::max_element(ofMany.best.begin(), ofMany.best.end()), 1000.0F);
   const std::vector<double> curve = flowDuration(whole.observed);
   EXPECT_EQ(curve.front(), 99.0);
   EXPECT_EQ(curve[curve.size() / 2], 49.0);
