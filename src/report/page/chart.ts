@@ -10,7 +10,7 @@ import { init, use, type ECharts, type EChartsCoreOption } from 'echarts/core';
 import { CanvasRenderer, SVGRenderer } from 'echarts/renderers';
 import { make, table } from './dom';
 import { csvOf, download, drawnValues, fileNameOf, wellFormed, type Values } from './figure_files';
-import { count, number } from './format';
+import { count, tick } from './format';
 import { kPaperLook, look, onLookChange, setPrinting, type Look } from './look';
 import { spaced } from './numbers';
 
@@ -130,6 +130,19 @@ class Drawn {
     this.chart?.dispatchAction({ type: 'dataZoom', start: 0, end: 100 });
   }
 
+  /** By keyboard: plus and minus zoom, the arrows move along the horizontal axis, Escape shows everything again. */
+  zoomByKey(event: KeyboardEvent): void {
+    if (event.key === 'Escape') this.resetZoom();
+    const { start = 0, end = 100 } = (this.chart?.getOption() as { dataZoom?: Zoom[] }).dataZoom?.[0] ?? {};
+    const span = end - start;
+    const kinds: Record<string, [number, number]> = { '+': [span / 2, 0], '-': [Math.min(100, span * 2), 0], ArrowLeft: [span, -span / 4], ArrowRight: [span, span / 4] };
+    const [width, move] = kinds[event.key] ?? [0, 0];
+    if (width === 0 || event.ctrlKey || event.metaKey || event.altKey) return;
+    event.preventDefault();
+    const from = Math.max(0, Math.min(100 - width, (start + end - width) / 2 + move));
+    this.chart!.dispatchAction({ type: 'dataZoom', dataZoomIndex: 0, start: from, end: from + width });
+  }
+
   /** A drawing for paper, of what is shown: as far as it is zoomed in, with the series that are switched on. */
   svg(width = this.small ? kSmallFileWidth : kFileWidth): string {
     const option = this.option(kPaperLook, width);
@@ -227,7 +240,7 @@ const inside = { type: 'inside', zoomOnMouseWheel: 'ctrl', moveOnMouseMove: fals
 export function timeZoom(look: Look, xAxisIndex: number[], filterMode: 'filter' | 'none', labelFormatter: (time: number) => string): object[] {
   return [
     { ...inside, xAxisIndex, filterMode },
-    { type: 'slider', xAxisIndex, filterMode, labelFormatter, height: 26, bottom: 8, left: 64, right: 16, showDataShadow: false, brushSelect: false,
+    { type: 'slider', xAxisIndex, filterMode, labelFormatter, height: 26, bottom: 8, left: 72, right: 16, showDataShadow: false, brushSelect: false,
       borderColor: look.rule, fillerColor: `${look.band}33`, textStyle: { color: look.muted },
       handleStyle: { color: look.surface, borderColor: look.muted }, moveHandleStyle: { color: look.muted } },
   ];
@@ -269,7 +282,7 @@ export interface AxisPlan {
 
 /** An axis in the page's style. */
 export function axis(look: Look, plan: AxisPlan): object {
-  const { log, name, integer, ...more } = plan;
+  const { log, name, integer = plan.minInterval === 1, ...more } = plan;
   const type = (more.type as string | undefined) ?? (log ? 'log' : 'value');
   return {
     type,
@@ -284,8 +297,8 @@ export function axis(look: Look, plan: AxisPlan): object {
     ...more,
     axisLabel: {
       color: look.muted, hideOverlap: true,
-      ...(type === 'value' || type === 'log' ? { formatter: (value: number) => (integer ? count(value) : number(value, 5)) } : {}),
-      ...(type === 'time' ? { formatter: timeLabel, showMinLabel: true } : {}),
+      ...(type === 'value' || type === 'log' ? { formatter: (value: number) => (integer ? count(value) : tick(value)) } : {}),
+      ...(type === 'time' ? { formatter: timeLabel, showMinLabel: true, alignMinLabel: 'left' } : {}),
       ...(more.axisLabel as object | undefined),
     },
   };
@@ -305,7 +318,10 @@ export function lineEntries(names: string[]): object[] {
 }
 
 export function chart(plan: ChartPlan): Chart {
-  const canvas = make('div', { class: 'canvas', role: 'img', 'aria-label': plan.title, style: `height: ${plan.height}px` });
+  const canvas = make('div', {
+    class: 'canvas', role: 'img', style: `height: ${plan.height}px`, tabindex: plan.zoom ? 0 : null,
+    'aria-label': plan.zoom ? `${plan.title}. Plus and minus zoom, arrow keys move along, Escape shows everything.` : plan.title,
+  });
   const note = make('p', { class: 'note' });
   const tools = make('div', { class: 'tools' });
   const figure = make('figure', { class: plan.small ? 'chart small' : 'chart' },
@@ -327,9 +343,10 @@ export function chart(plan: ChartPlan): Chart {
     tools.append(button);
   }
   if (plan.zoom) {
+    canvas.addEventListener('keydown', (event) => drawn.zoomByKey(event));
     tools.append(make('button', {
       type: 'button', class: 'reset', onclick: () => drawn.resetZoom(),
-      title: 'Drag across the chart to zoom in, or hold Ctrl and turn the wheel. A double click shows everything again.',
+      title: 'Drag across the chart to zoom in, or hold Ctrl and turn the wheel, or press + and \u2212 in it. A double click or Escape shows everything again.',
     }, 'Reset zoom'));
   }
   const take = (ending: string, label: string, hint: string, kind: string, content: () => string) => tools.append(make('button', {

@@ -31,6 +31,14 @@ export function number(value: Maybe | undefined, digits = 4): string {
   return minus(String(Number(value.toPrecision(digits))));
 }
 
+/** `value` beside an axis, where there is room for few characters. */
+export function tick(value: number): string {
+  const size = Math.abs(value);
+  if (value === 0 || (size >= 1e-3 && size < 1e6)) return number(value, 5);
+  const [mantissa, exponent] = value.toExponential(4).split('e');
+  return minus(`${Number(mantissa)}e${Number(exponent)}`);
+}
+
 /** A count, its thousands set apart by a narrow space. */
 export function count(value: number): string {
   if (isPlain) return String(value);

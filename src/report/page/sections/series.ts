@@ -74,7 +74,7 @@ function hydrographPlan(data: ReportData, series: Series): ChartPlan {
         dataset: { source, dimensions: ['time', ...Object.keys(source).filter((key) => key !== 'time')] },
         legend: legend(look, { data: lineEntries(['observed', ...simulated.map(({ name }) => name)]), itemWidth: 34 }),
         axisPointer: { link: [{ xAxisIndex: 'all' }], lineStyle: { color: look.muted } },
-        grid: [{ left: 64, right: 16, top: 36, height: 262, outerBoundsMode: 'none' }, { left: 64, right: 16, top: 338, height: 86, outerBoundsMode: 'none' }],
+        grid: [{ left: 72, right: 16, top: 36, height: 262, outerBoundsMode: 'none' }, { left: 72, right: 16, top: 338, height: 86, outerBoundsMode: 'none' }],
         xAxis: [
           axis(look, { type: 'time', min: times[0], max: times[times.length - 1], axisLabel: { show: false }, axisTick: { show: false } }),
           axis(look, { type: 'time', gridIndex: 1, min: times[0], max: times[times.length - 1], axisLine: { onZero: false } }),

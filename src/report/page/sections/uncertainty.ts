@@ -18,7 +18,7 @@ function histogramPlan(name: string, values: Maybe[], wantsLog = false): ChartPl
     small: true,
     option: (look) => ({
       grid: { left: 16, right: 14, top: 12, bottom: 16 },
-      xAxis: axis(look, { log, splitNumber: 4, splitLine: { show: false }, min: bins[0]?.from, max: bins[bins.length - 1]?.to }),
+      xAxis: axis(look, { log, splitNumber: 4, splitLine: { show: false }, min: bins[0]?.from, max: bins[bins.length - 1]?.to, axisLabel: { showMinLabel: false, showMaxLabel: false } }),
       yAxis: axis(look, { scale: false, splitNumber: 3, minInterval: 1 }),
       tooltip: tooltip(look, { formatter: (bar: { dataIndex: number }) =>
         tip(bounds(bins[bar.dataIndex]!), [['evaluations', count(bins[bar.dataIndex]!.count)]]) }),
@@ -99,7 +99,7 @@ function bandPlan(band: Band): ChartPlan {
         dataset: { source: { time: times, p5: scaled(band.p5), p50: scaled(band.p50), p95: scaled(band.p95), observed: scaled(band.observed) },
           dimensions: ['time', 'p5', 'p50', 'p95', 'observed'] },
         legend: legend(look, { data: ['5 to 95 %', ...lineEntries(['median', 'observed'])], itemWidth: 34 }),
-        grid: { left: 64, right: 16, top: 36, bottom: 72 },
+        grid: { left: 72, right: 16, top: 36, bottom: 72 },
         xAxis: [axis(look, { type: 'time', min: first, max: last })],
         yAxis: axis(look, { name: band.unit || 'Value', log: is('log'), nameGap: 48, ...(is('log') ? {} : { scale: false }) }),
         dataZoom: timeZoom(look, [0], 'none', (time) => moment(time, step)),
