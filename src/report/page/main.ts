@@ -4,6 +4,7 @@ import { readReportData, type ReportData } from './data';
 import { make } from './dom';
 import { nameFilesAfter } from './figure_files';
 import { switchTheme } from './look';
+import { historySection } from './sections/histories';
 import { failureSection, head, parameterSection, resultSection, runSection, summarySection } from './sections/overview';
 import { dottySection, goodSetsSection, progressSection } from './sections/search';
 import type { Section } from './sections/section';
@@ -21,6 +22,7 @@ function sections(data: ReportData): Section[] {
     parameterSection(data),
     resultSection(data),
     sampled ? progressSection(data) : null,
+    task === 'optimisation' ? historySection(data) : null,
     task === 'uncertainty' ? distributionSection(data) : null,
     sampled ? dottySection(data, task === 'uncertainty' ? 'Parameters against objectives' : 'Dotty plots') : null,
     task === 'optimisation' ? goodSetsSection(data) : null,
