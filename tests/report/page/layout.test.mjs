@@ -69,6 +69,19 @@ for (const [name, data] of Object.entries(cases)) {
   });
 }
 
+test('a short time axis says which year it is', async () => {
+  const data = sample.dataOf('optimisation');
+  for (const [start, hours, values] of [['1981-10-05T06:00:00', 1, 14], ['1981-10-03T00:00:00', 24, 20], ['1981-03-12T00:00:00', 24, 200]]) {
+    for (const name of ['observed', 'initial', 'best']) data.series[0][name] = Array.from({ length: values }, (_, index) => 5 + index % 7);
+    Object.assign(data.series[0], { start, step: hours * 3600000, count: values, period: null });
+    const { page } = await browser.openReport(data, { width: 390 });
+    for (const width of [330, 1000]) {
+      assert.match(await page.evaluate((wide) => window.drawingOf(document.querySelector('#series figure'), wide), width), />[^<]*\b1981\b/, `${start}, ${width}`);
+    }
+    await page.context().close();
+  }
+});
+
 /** Runs in the page: what has the focus, and what is wrong with how it shows. */
 function focused() {
   const element = document.activeElement;

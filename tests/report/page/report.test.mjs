@@ -136,6 +136,20 @@ test('a print has every chart, in light colours, and leaves the screen as it was
   });
 });
 
+test('of many charts those in view are drawn, the others when they come into view, and all for a print', async () => {
+  const { page } = await browser.openReport(sample.manyParameters(60));
+  const drawn = () => page.locator('figure[data-drawn]').count();
+  const all = await page.locator('figure').count();
+  assert.ok(all > 100 && await drawn() > 0 && await drawn() < 20, `${await drawn()} of ${all}`);
+  await page.locator('#dotty figure').last().scrollIntoViewIfNeeded();
+  await page.locator('#dotty figure').last().and(page.locator('[data-drawn]')).waitFor();
+  await page.evaluate(() => dispatchEvent(new Event('beforeprint')));
+  const blank = await page.$$eval('figure canvas.picture', (pictures) => pictures.filter((picture) =>
+    new Set(new Uint32Array(picture.getContext('2d').getImageData(0, 0, picture.width, picture.height).data.buffer)).size < 10).length);
+  assert.deepEqual([await page.locator('figure canvas.picture').count(), blank], [all, 0]);
+  await page.context().close();
+});
+
 test('20 000 evaluations and 20 years of days are drawn thinned and counted in full', async (context) => {
   await withReport(sample.stretched(20000, 7305), {}, async (page) => {
     const [drawn, size] = await page.evaluate(() => [document.documentElement.dataset.drawn, document.documentElement.outerHTML.length]);
