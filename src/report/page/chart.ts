@@ -58,6 +58,18 @@ const coming = new IntersectionObserver((entries) => {
   for (const entry of entries) drawers.get(entry.target)?.see(entry.isIntersecting);
 }, { rootMargin: '400px' });
 
+// Those that have come into view are drawn over successive frames, so that scrolling goes on meanwhile.
+const arrived = new Set<Drawn>();
+function drawArrived(): void {
+  const until = performance.now() + 10;
+  for (const drawn of arrived) {
+    arrived.delete(drawn);
+    drawn.catchUp();
+    if (performance.now() > until) break;
+  }
+  if (arrived.size > 0) requestAnimationFrame(drawArrived);
+}
+
 type Zoom = { type: string; start?: number; end?: number };
 
 class Drawn {
@@ -83,7 +95,11 @@ class Drawn {
 
   see(isInView: boolean): void {
     this.isInView = isInView;
-    if (!isInView || this.picture) return;
+    if (isInView && arrived.add(this).size === 1) requestAnimationFrame(drawArrived);
+  }
+
+  catchUp(): void {
+    if (!this.isInView || this.picture) return;
     if (!this.chart) this.draw();
     else if (this.isStale) this.refresh();
   }
@@ -392,8 +408,9 @@ export function drawInTime(allDrawn: () => void): void {
     const until = performance.now() + 30;
     while (waiting.length > 0 && performance.now() < until) waiting.shift()!.draw();
     if (waiting.length > 0) setTimeout(next, 0);
-    else requestAnimationFrame(() => requestAnimationFrame(allDrawn)); // by then those in view are drawn
+    else requestAnimationFrame(() => setTimeout(untilQuiet, 0)); // by then it is known which are in view
   };
+  const untilQuiet = () => (arrived.size > 0 ? requestAnimationFrame(untilQuiet) : allDrawn());
   setTimeout(next, 0);
 
   onLookChange(() => all().forEach((drawn) => drawn.redraw()));
