@@ -157,8 +157,9 @@ void writeSeries(JsonWriter& json, const ReportData& data) {
   json.key("series").beginArray();
   for (const ShownSeries& series : data.series.series) {
     json.beginObject().member("measure", series.measure).key("unit").null();
-    const bool isThinned = series.seconds.size() > kMostDrawnTimes;
-    const ShownSeries& drawn = isThinned ? thinned(series) : series;
+    const std::size_t most = mostDrawnTimes(data.series.series.size());
+    const bool isThinned = series.seconds.size() > most;
+    const ShownSeries& drawn = isThinned ? thinned(series, most) : series;
     writeTimes(json, drawn.seconds);
     json.key("observed").numbers(drawn.observed, Digits::drawn);
     if (data.series.initial) json.key("initial").numbers(drawn.initial, Digits::drawn);
@@ -210,8 +211,9 @@ void writeGaps(JsonWriter& json, std::string_view name, const TimedValues& drawn
 void writeBands(JsonWriter& json, const ReportData& data) {
   json.key("band").beginArray();
   for (const ReportedBand& whole : data.bands) {
-    const bool isThinned = whole.seconds.size() > kMostDrawnTimes;
-    const ReportedBand& band = isThinned ? thinned(whole) : whole;
+    const std::size_t most = mostDrawnTimes(data.bands.size());
+    const bool isThinned = whole.seconds.size() > most;
+    const ReportedBand& band = isThinned ? thinned(whole, most) : whole;
     json.beginObject().member("measure", band.measure);
     writeTimes(json, band.seconds);
     json.key("observed").numbers(band.observed, Digits::drawn).key("p5").numbers(band.lower, Digits::drawn);

@@ -9,6 +9,8 @@ namespace mirevo {
 namespace {
 
 constexpr std::size_t kDurationPoints = 1000;
+constexpr std::size_t kMostDrawnTimesOfAll = 600'000;
+constexpr std::size_t kFewestDrawnTimes = 6'000;
 constexpr std::size_t kPlacesOfExtremes = 2;
 constexpr std::size_t kPlacesOfGap = 3;
 /// Of the times that are drawn a fifth is for the gaps.
@@ -83,13 +85,13 @@ void addGaps(std::span<const std::int64_t> seconds, const std::vector<float>& va
   add();
 }
 
-/// Ascending; all of them if there are few.
-std::vector<std::size_t> drawnPlaces(std::span<const std::int64_t> seconds, Columns columns) {
+/// At most `most`, ascending; all of them if there are few.
+std::vector<std::size_t> drawnPlaces(std::span<const std::int64_t> seconds, Columns columns, std::size_t most) {
   const std::size_t count = seconds.size();
   std::vector<std::size_t> places;
   // Columns with few values are drawn whole and take half of the places at most.
   std::vector<const std::vector<float>*> thinnedColumns;
-  const std::size_t few = kMostDrawnTimes / (2 * columns.size());
+  const std::size_t few = most / (2 * columns.size());
   for (const std::vector<float>* const column : columns) {
     const auto isValue = [](float value) { return std::isfinite(value); };
     if (static_cast<std::size_t>(std::count_if(column->begin(), column->end(), isValue)) > few) {
@@ -100,7 +102,7 @@ std::vector<std::size_t> drawnPlaces(std::span<const std::int64_t> seconds, Colu
       if (isValue((*column)[i])) places.push_back(i);
     }
   }
-  const std::size_t left = kMostDrawnTimes - places.size();
+  const std::size_t left = most - places.size();
   const std::size_t forGaps = left / kShareOfGaps;
   const std::size_t columnCount = std::max<std::size_t>(thinnedColumns.size(), 1);
   const std::size_t spans = (left - forGaps) / (kPlacesOfExtremes * columnCount);
@@ -129,6 +131,10 @@ Values at(const std::vector<std::size_t>& places, const Values& values) {
 
 }  // namespace
 
+std::size_t mostDrawnTimes(std::size_t count) {
+  return std::clamp(kMostDrawnTimesOfAll / std::max<std::size_t>(count, 1), kFewestDrawnTimes, kMostDrawnTimes);
+}
+
 std::vector<std::size_t> gapsOf(const TimedValues& drawn, const TimedValues& whole) {
   const std::vector<std::int64_t> times = timesOfValues(whole);
   const auto usual = longestUsualStep(times);
@@ -145,9 +151,9 @@ std::vector<std::size_t> gapsOf(const TimedValues& drawn, const TimedValues& who
   return gaps;
 }
 
-ShownSeries thinned(const ShownSeries& series) {
+ShownSeries thinned(const ShownSeries& series, std::size_t most) {
   const std::vector<float>* const columns[] = {&series.observed, &series.initial, &series.best};
-  const std::vector<std::size_t> places = drawnPlaces(series.seconds, columns);
+  const std::vector<std::size_t> places = drawnPlaces(series.seconds, columns, most);
   ShownSeries drawn;
   drawn.measure = series.measure;
   drawn.seconds = at(places, series.seconds);
@@ -157,9 +163,9 @@ ShownSeries thinned(const ShownSeries& series) {
   return drawn;
 }
 
-ReportedBand thinned(const ReportedBand& band) {
+ReportedBand thinned(const ReportedBand& band, std::size_t most) {
   const std::vector<float>* const columns[] = {&band.observed, &band.lower, &band.median, &band.upper};
-  const std::vector<std::size_t> places = drawnPlaces(band.seconds, columns);
+  const std::vector<std::size_t> places = drawnPlaces(band.seconds, columns, most);
   ReportedBand drawn = band;
   drawn.seconds = at(places, band.seconds);
   drawn.observed = at(places, band.observed);

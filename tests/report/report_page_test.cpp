@@ -104,6 +104,9 @@ TEST(ReportPage, TimesAreAStepWhereTheyAreRegularAndALongSeriesIsThinnedForDrawi
   const auto gap = std::find_if(drawn.best.begin(), drawn.best.end(), [](float value) { return std::isnan(value); });
   EXPECT_LT(gap - drawn.best.begin(), 43) << "no line is drawn over it";
   EXPECT_EQ(std::count(drawn.initial.begin(), drawn.initial.end(), 3.0F), 2);
+  const ShownSeries ofMany = thinned(whole, mostDrawnTimes(50));
+  EXPECT_LE(ofMany.seconds.size(), kMostDrawnTimes / 8);
+  EXPECT_EQ(*std::max_element(ofMany.best.begin(), ofMany.best.end()), 1000.0F);
   const std::vector<double> curve = flowDuration(whole.observed);
   EXPECT_EQ(curve.front(), 99.0);
   EXPECT_EQ(curve[curve.size() / 2], 49.0);

@@ -25,6 +25,7 @@ export interface Column {
   title: string;
   number?: boolean; // set flush right
   hint?: string;
+  unit?: string | null;
 }
 
 /** A table in a frame that scrolls sideways where the window is narrow. */

@@ -74,6 +74,9 @@ export function look(): Look {
   return theme() === 'dark' ? kDark : kLight;
 }
 
+/** The look on paper, and of drawings that are taken along. */
+export const kPaperLook = kLight;
+
 /** Calls `listener` whenever another look is to be drawn. */
 export function onLookChange(listener: () => void): void {
   listeners.push(listener);

@@ -1,9 +1,11 @@
 // Builds the page from the data that the program wrote into it.
-import { drawInTime, drawnOptions } from './chart';
+import { drawingOf, drawInTime, drawnOptions } from './chart';
 import { readReportData, type ReportData } from './data';
 import { make } from './dom';
+import { nameFilesAfter } from './figure_files';
 import { switchTheme } from './look';
 import { comparisonSection } from './sections/comparisons';
+import { historySection } from './sections/histories';
 import { failureSection, head, parameterSection, resultSection, runSection, summarySection } from './sections/overview';
 import { dottySection, goodSetsSection, progressSection } from './sections/search';
 import type { Section } from './sections/section';
@@ -22,6 +24,7 @@ function sections(data: ReportData): Section[] {
     resultSection(data),
     comparisonSection(data),
     sampled ? progressSection(data) : null,
+    task === 'optimisation' ? historySection(data) : null,
     task === 'uncertainty' ? distributionSection(data) : null,
     sampled ? dottySection(data, task === 'uncertainty' ? 'Parameters against objectives' : 'Dotty plots') : null,
     task === 'optimisation' ? goodSetsSection(data) : null,
@@ -44,6 +47,7 @@ function contents(shown: Section[]): HTMLElement {
 
 function build(place: HTMLElement): void {
   const data = readReportData(document.getElementById('report-data')!.textContent!);
+  nameFilesAfter(data.run.setupName);
   const shown = sections(data);
   place.append(
     contents(shown),
@@ -58,7 +62,7 @@ try {
   drawInTime(() => {
     document.documentElement.dataset.drawn = String(Math.round(performance.now()));
   });
-  Object.assign(window, { drawnOptions });
+  Object.assign(window, { drawingOf, drawnOptions });
 } catch (error) {
   place.append(make('p', { class: 'broken', role: 'alert' }, `This report cannot be shown: ${error instanceof Error ? error.message : String(error)}`));
   throw error;

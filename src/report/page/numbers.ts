@@ -19,13 +19,18 @@ export function quantile(ordered: readonly number[], probability: number): numbe
   return low + (high - low) * (place - below);
 }
 
-/** The smallest value up to each place; null before the first value. */
-export function bestSoFar(values: readonly Maybe[]): Maybe[] {
-  let best: Maybe = null;
-  return values.map((value) => {
-    if (value !== null && (best === null || value <= best)) best = value;
+/** The place of the smallest value up to each place, of equals the last; null before the first value. */
+export function placesOfBest(values: readonly Maybe[]): (number | null)[] {
+  let best: number | null = null;
+  return values.map((value, place) => {
+    if (value !== null && (best === null || value <= values[best]!)) best = place;
     return best;
   });
+}
+
+/** The smallest value up to each place; null before the first value. */
+export function bestSoFar(values: readonly Maybe[]): Maybe[] {
+  return placesOfBest(values).map((place) => (place === null ? null : values[place]!));
 }
 
 /** Places of the best `share` of the values (the smallest; ten at least where there are as many), best first. */

@@ -31,7 +31,7 @@ const blankCharts = (page) => page.$$eval('figure', (figures) => figures.filter(
 const sectionsOf = (page) => page.$$eval('main > section', (found) => found.map(({ id }) => id));
 const zoomOf = (page, figure) => page.evaluate((element) => window.drawnOptions(element).dataZoom.map(({ start, end }) => [start, end])[0], figure);
 
-const kOptimisation = ['series', 'parameters', 'results', 'progress', 'dotty', 'good-sets', 'failures', 'run', 'summary'];
+const kOptimisation = ['series', 'parameters', 'results', 'progress', 'histories', 'dotty', 'good-sets', 'failures', 'run', 'summary'];
 /** Names are text wherever they stand, tables that open later and tooltips included. */
 async function checkHostile(page) {
   const shown = await page.evaluate(() => document.getElementById('report').textContent);
@@ -46,15 +46,15 @@ async function checkHostile(page) {
 }
 
 const cases = {
-  'a search': [sample.dataOf('optimisation'), 3 + 2 + 2 + 2, kOptimisation],
-  'a search by few evaluations with two series': [sample.twoSeries(), 6 + 1 + 2 + 2,
+  'a search': [sample.dataOf('optimisation'), 3 + 2 + 2 + 2 + 2, kOptimisation],
+  'a search by few evaluations with two series': [sample.twoSeries(), 6 + 1 + 2 + 2 + 2,
     kOptimisation.filter((id) => id !== 'failures')],
   'an uncertainty analysis': [sample.dataOf('uncertainty'), 1 + 3 + 1 + 5 + 2, ['band', 'series', 'parameters', 'results', 'progress', 'distributions', 'dotty', 'failures', 'run', 'summary']],
   'a sensitivity analysis': [sample.dataOf('sensitivity'), 4 + 3, ['sensitivity', 'series', 'parameters', 'results', 'run', 'summary']],
   'scenario runs': [sample.dataOf('scenarios'), 3 + 1 + 2, ['series', 'parameters', 'results', 'progress', 'dotty', 'run', 'summary']],
   'a run without an evaluation': [sample.empty(), 0, ['run']],
   'a run whose evaluations all failed': [sample.dataOf('allFailed'), 0, ['parameters', 'results', 'failures', 'run', 'summary']],
-  'a search with hostile names': [sample.hostile(sample.dataOf('optimisation')), 3 + 2 + 2 + 2, kOptimisation, true],
+  'a search with hostile names': [sample.hostile(sample.dataOf('optimisation')), 3 + 2 + 2 + 2 + 2, kOptimisation, true],
   'an uncertainty analysis with hostile names': [sample.hostile(sample.dataOf('uncertainty')), 12, null, true],
   'a sensitivity analysis with hostile names': [sample.hostile(sample.dataOf('sensitivity')), 7, null, true],
 };
@@ -144,7 +144,7 @@ test('the reader changes what dots are drawn against, and between light and dark
 test('a print has every chart, in light colours, and leaves the screen as it was', async () => {
   await withReport(sample.dataOf('optimisation'), { colorScheme: 'dark' }, async (page) => {
     await page.evaluate(() => dispatchEvent(new Event('beforeprint')));
-    assert.equal(await page.locator('figure canvas.picture').count(), 9);
+    assert.equal(await page.locator('figure canvas.picture').count(), 11);
     assert.deepEqual(await blankCharts(page), []);
     assert.equal(await page.evaluate(() => document.documentElement.dataset.theme), 'light');
     await page.evaluate(() => dispatchEvent(new Event('afterprint')));
@@ -154,6 +154,20 @@ test('a print has every chart, in light colours, and leaves the screen as it was
     assert.equal(await page.evaluate(() => document.documentElement.dataset.theme), 'dark');
     assert.deepEqual(await blankCharts(page), []);
   });
+});
+
+test('of many charts those in view are drawn, the others when they come into view, and all for a print', async () => {
+  const { page } = await browser.openReport(sample.manyParameters(60));
+  const drawn = () => page.locator('figure[data-drawn]').count();
+  const all = await page.locator('figure').count();
+  assert.ok(all > 100 && await drawn() > 0 && await drawn() < 20, `${await drawn()} of ${all}`);
+  await page.locator('#dotty figure').last().scrollIntoViewIfNeeded();
+  await page.locator('#dotty figure').last().and(page.locator('[data-drawn]')).waitFor();
+  await page.evaluate(() => dispatchEvent(new Event('beforeprint')));
+  const blank = await page.$$eval('figure canvas.picture', (pictures) => pictures.filter((picture) =>
+    new Set(new Uint32Array(picture.getContext('2d').getImageData(0, 0, picture.width, picture.height).data.buffer)).size < 10).length);
+  assert.deepEqual([await page.locator('figure canvas.picture').count(), blank], [all, 0]);
+  await page.context().close();
 });
 
 test('20 000 evaluations and 20 years of days are drawn thinned and counted in full', async (context) => {
@@ -166,6 +180,9 @@ test('20 000 evaluations and 20 years of days are drawn thinned and counted in f
     await page.getByText('200 of 20\u202f000 rows').waitFor();
     const dots = await page.evaluate(() => window.drawnOptions(document.querySelector('#dotty figure')).series[0].data.length);
     assert.ok(dots > 500 && dots < 18000, `${dots} dots`);
+    const [tried, best] = await page.evaluate(() => window.drawnOptions(document.querySelector('#histories figure')).series.map(({ data }) => data));
+    assert.ok(tried.length > 500 && tried.length < 18000, `${tried.length} dots`);
+    assert.equal(best.at(-1)[0], 20000, 'the line of the best set reaches to the end');
   });
 });
 

@@ -26,6 +26,19 @@ export function twoSeries() {
   return data;
 }
 
+/** A search of so many parameters, some of them with large and small values. */
+export function manyParameters(count) {
+  const data = dataOf('optimisation');
+  const { evaluations, parameters } = data;
+  for (let index = parameters.length; index < count; ++index) {
+    const scale = [1, 1e5, 1e-3][index % 3];
+    const { lower, upper, start, best } = parameters[0];
+    parameters.push({ ...parameters[0], name: `parameter ${index}`, lower: lower * scale, upper: upper * scale, start: start * scale, best: best * scale, integer: index % 4 === 1 });
+    evaluations.parameters.push(evaluations.parameters[index % 2].map((value) => value * scale));
+  }
+  return data;
+}
+
 /** A search as if it had made `count` evaluations, each time round a little further on, against `days` of daily series. */
 export function stretched(count, days) {
   const data = dataOf('optimisation');

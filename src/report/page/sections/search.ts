@@ -2,7 +2,7 @@
 import { axis, chart, legend, lineEntries, tip, tooltip, type Chart, type ChartPlan } from '../chart';
 import { variableParameters, type Maybe, type Parameter, type ReportData } from '../data';
 import { choice, shorten } from '../dom';
-import { count, number } from '../format';
+import { count, number, tick } from '../format';
 import { axisTop, bestShare, bestSoFar, correlation, finite, placeBetweenBounds, quantile, sorted, spaced, thin } from '../numbers';
 import { heatmap } from './heatmap';
 import { grid, paragraph, type Section } from './section';
@@ -106,6 +106,11 @@ function dottyPlan(data: ReportData, parameter: Parameter, column: Maybe[], judg
         ],
       };
     },
+    csv: () => ({
+      columns: [{ title: 'Evaluation' }, { title: parameter.name }, { title: judgement().name }],
+      length: column.length,
+      row: (place) => [count(data.evaluations.numbers[place]!), number(column[place]), number(judgement().values[place])],
+    }),
   };
 }
 
@@ -145,23 +150,26 @@ function parallelPlan(data: ReportData, good: number[]): ChartPlan {
   const values = drawn.map((place) => ({
     value: [...variable.map((_, index) => parameters[index]?.[place] ?? NaN), aggregate[place]!], name: numbers[place],
   }));
+  // Where axes are close, their names are at a slant and their numbers, which would overlap, are left to the tooltip.
+  const apart = (width: number) => (width - 120) / variable.length;
+  const isClose = (width: number) => apart(width) < 110;
   return {
     title: `Parallel coordinates of the ${nameOfGood(data, good)}`,
     note: `Each line is a parameter set, the colour its aggregate; the thick line is the best. Drag along an axis to pick lines.${
       good.length > drawn.length ? ` ${count(drawn.length)} of ${count(good.length)} lines are drawn.` : ''}`,
     height: 400,
     switches: [{ key: 'fit', label: 'Fit axes', hint: 'Axes over the values of these sets instead of the bounds' }],
-    option: (look, is) => ({
+    option: (look, is, width) => ({
       parallelAxis: [...variable.map((parameter, dim) => ({
-        dim, name: shorten(parameter.name, 18), scale: true, min: is('fit') ? 'dataMin' : parameter.lower, max: is('fit') ? 'dataMax' : parameter.upper,
+        dim, name: shorten(parameter.name, isClose(width) ? 12 : 18), scale: true, min: is('fit') ? 'dataMin' : parameter.lower, max: is('fit') ? 'dataMax' : parameter.upper,
         type: parameter.transformation === 'logarithmic' && (parameter.lower ?? 0) > 0 ? 'log' : 'value',
       })), { dim: variable.length, name: 'Aggregate', scale: true, type: 'value' }],
       parallel: {
-        left: 50, right: 70, top: 48, bottom: 24,
+        left: 50, right: 70, top: isClose(width) ? 84 : 48, bottom: 24,
         parallelAxisDefault: {
-          nameLocation: 'end', nameGap: 16, nameTextStyle: { color: look.ink, fontSize: 12 },
+          nameLocation: 'end', nameGap: 16, nameRotate: isClose(width) ? 45 : undefined, nameTextStyle: { color: look.ink, fontSize: 12 },
           axisLine: { lineStyle: { color: look.muted } }, axisTick: { lineStyle: { color: look.muted } },
-          axisLabel: { color: look.muted, fontSize: 10, formatter: (value: number) => number(value, 5) },
+          axisLabel: { color: look.muted, fontSize: 10, formatter: apart(width) < 52 ? () => '' : tick },
           areaSelectStyle: { color: look.band, borderColor: look.band, opacity: 0.3, width: 16 },
         },
       },
@@ -177,6 +185,11 @@ function parallelPlan(data: ReportData, good: number[]): ChartPlan {
           emphasis: { lineStyle: { width: 2.5, opacity: 1 } } },
         { type: 'parallel', data: values.slice(-1), z: 5, silent: true, lineStyle: { width: 3, opacity: 1, color: look.ink } },
       ],
+    }),
+    csv: () => ({
+      columns: ['Evaluation', ...variable.map(({ name }) => name), 'Aggregate'].map((title) => ({ title })),
+      length: good.length,
+      row: (rank) => [count(numbers[good[rank]!]!), ...variable.map((_, index) => number(parameters[index]?.[good[rank]!])), number(aggregate[good[rank]!])],
     }),
   };
 }

@@ -62,6 +62,7 @@ function hydrographPlan(data: ReportData, series: Series): ChartPlan {
     note: `Residual: ${judged ? shorten(judged.name, 60) : 'simulated'} less observed.${outside(times, series.period).length > 0 ? ' Shaded: outside the evaluation period.' : ''} ${series.thinned ? ' Of so many times the extremes of short spans are drawn.' : ''} Drag across the chart to zoom in, move the slider below to go along.`,
     height: 492,
     zoom: 'x',
+    thinned: series.thinned,
     switches: [{ key: 'log', label: 'Log' }],
     option: (look, is) => {
       const style = lineStyles(look);
@@ -75,7 +76,7 @@ function hydrographPlan(data: ReportData, series: Series): ChartPlan {
         dataset: { source, dimensions: ['time', ...Object.keys(source).filter((key) => key !== 'time')] },
         legend: legend(look, { data: lineEntries(['observed', ...simulated.map(({ name }) => name)]), itemWidth: 34 }),
         axisPointer: { link: [{ xAxisIndex: 'all' }], lineStyle: { color: look.muted } },
-        grid: [{ left: 64, right: 16, top: 36, height: 262, outerBoundsMode: 'none' }, { left: 64, right: 16, top: 338, height: 86, outerBoundsMode: 'none' }],
+        grid: [{ left: 72, right: 16, top: 36, height: 262, outerBoundsMode: 'none' }, { left: 72, right: 16, top: 338, height: 86, outerBoundsMode: 'none' }],
         xAxis: [
           axis(look, { type: 'time', min: times[0], max: times[times.length - 1], axisLabel: { show: false }, axisTick: { show: false } }),
           axis(look, { type: 'time', gridIndex: 1, min: times[0], max: times[times.length - 1], axisLine: { onZero: false } }),
@@ -104,8 +105,7 @@ function hydrographPlan(data: ReportData, series: Series): ChartPlan {
       };
     },
     values: () => ({
-      columns: [{ title: 'Time' }, { title: 'observed', number: true }, ...simulated.map(({ name }) => ({ title: name, number: true })),
-        { title: 'residual', number: true }],
+      columns: [{ title: 'Time' }, ...['observed', ...simulated.map(({ name }) => name), 'residual'].map((title) => ({ title, number: true, unit: series.unit }))],
       length: times.length,
       row: (place) => [moment(times[place]!, step), number(series.observed[place]), ...simulated.map(({ values }) => number(values[place])),
         number(residuals?.[place])],
@@ -129,6 +129,7 @@ function scatterPlan(data: ReportData, series: Series): ChartPlan {
     title: 'Simulated against observed',
     height: 340,
     small: true,
+    thinned: series.thinned,
     zoom: 'xy',
     switches: [{ key: 'log', label: 'Log' }],
     option: (look, is) => {
@@ -199,7 +200,7 @@ function durationPlan(data: ReportData, series: Series): ChartPlan {
       })),
     }),
     values: () => ({
-      columns: [{ title: 'Time exceeded (%)', number: true }, ...curves.map(({ name }) => ({ title: name, number: true }))],
+      columns: [{ title: 'Time exceeded (%)', number: true }, ...curves.map(({ name }) => ({ title: name, number: true, unit: series.unit }))],
       length: Math.max(...curves.map(({ points }) => points.length)),
       row: (index) => [number(curves[curves.length - 1]!.points[index]?.[0]), ...curves.map(({ points }) => number(points[index]?.[1]))],
     }),

@@ -19,7 +19,7 @@ function histogramPlan(name: string, values: Maybe[], wantsLog = false): ChartPl
     small: true,
     option: (look) => ({
       grid: { left: 16, right: 14, top: 12, bottom: 16 },
-      xAxis: axis(look, { log, splitNumber: 4, splitLine: { show: false }, min: bins[0]?.from, max: bins[bins.length - 1]?.to }),
+      xAxis: axis(look, { log, splitNumber: 4, splitLine: { show: false }, min: bins[0]?.from, max: bins[bins.length - 1]?.to, axisLabel: { showMinLabel: false, showMaxLabel: false } }),
       yAxis: axis(look, { scale: false, splitNumber: 3, minInterval: 1 }),
       tooltip: tooltip(look, { formatter: (bar: { dataIndex: number }) =>
         tip(bounds(bins[bar.dataIndex]!), [['evaluations', count(bins[bar.dataIndex]!.count)]]) }),
@@ -135,7 +135,7 @@ function bandPlan(band: Band): ChartPlan {
       const [first, last] = [times[0]!, times[times.length - 1]!];
       return {
         legend: legend(look, { data: ['5 to 95 %', ...lineEntries(['median', 'observed'])], itemWidth: 34 }),
-        grid: { left: 64, right: 16, top: 36, bottom: 72 },
+        grid: { left: 72, right: 16, top: 36, bottom: 72 },
         xAxis: [axis(look, { type: 'time', min: first, max: last })],
         yAxis: axis(look, { name: band.unit || 'Value', log: is('log'), nameGap: 48, ...(is('log') ? {} : { scale: false }) }),
         dataZoom: timeZoom(look, [0], 'none', (time) => moment(time, step)),
@@ -168,7 +168,8 @@ function bandPlan(band: Band): ChartPlan {
       };
     },
     values: () => ({
-      columns: [{ title: 'Time' }, ...['observed', '5 %', 'median', '95 %', ...(band.runs ? ['runs'] : [])].map((title) => ({ title, number: true }))],
+      columns: [{ title: 'Time' }, ...['observed', '5 %', 'median', '95 %'].map((title) => ({ title, number: true, unit: band.unit })),
+        ...(band.runs ? [{ title: 'runs', number: true }] : [])],
       length: times.length,
       row: (place) => [moment(times[place]!, step), ...[band.observed, band.p5, band.p50, band.p95].map((values) => number(values[place])),
         ...(band.runs ? [count(band.runs[place] ?? 0)] : [])],
