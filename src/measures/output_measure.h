@@ -61,6 +61,8 @@ struct OutputMeasure {
   std::string functionName;    ///< the objective function that it belongs to; empty: none
   SeriesReference simulation;  ///< in or below the base folder
   SeriesReference observation;
+  std::string displayName = {};  ///< of the quantity, for people; empty: the name of the observed item
+  std::string unit = {};         ///< of the values; empty: as the observed file says
 };
 
 /// Values of series in 32 bits, as the statistics of a run use them, or with all digits of their file.

@@ -8,7 +8,9 @@
 #include <vector>
 
 #include "report/failure_reasons.h"
+#include "report/series_labels.h"
 #include "run/results/run_record.h"
+#include "run/results/scenario_series.h"
 #include "run/results/series_table.h"
 
 namespace mirevo {
@@ -135,6 +137,9 @@ struct ReportData {
   std::int64_t periodFirst = 0;  ///< secondNumber() of the ends of the evaluation period
   std::int64_t periodLast = 0;
   SeriesTable series;
+  std::vector<SeriesLabel> seriesLabels;  ///< one per series
+  std::vector<ScenarioSeries> scenarioSeries;
+  std::vector<std::string> runNames;  ///< of the evaluations, from the first on; empty where one has none
   std::vector<ReportedBand> bands;
   std::optional<ReportedSensitivity> sensitivity;
   std::vector<std::string> summary;  ///< the closing lines of the result file

@@ -11,6 +11,7 @@ import { make, table, type Column } from './dom';
 import { count, number } from './format';
 import { look, onLookChange, setPrinting, type Look } from './look';
 import { spaced } from './numbers';
+import { timeLabel } from './ticks';
 
 use([
   BarChart, CustomChart, HeatmapChart, LineChart, ParallelChart, ScatterChart,
@@ -184,9 +185,6 @@ function zooming(zoom: ChartPlan['zoom'], option: Option): Option {
   };
 }
 
-// The same style for all units; by default the library sets the larger ones in bold.
-const kTimeLabels = { year: '{yyyy}', month: '{MMM}', day: '{d} {MMM}', hour: '{HH}:{mm}', minute: '{HH}:{mm}', second: '{HH}:{mm}:{ss}' };
-
 export interface AxisPlan {
   name?: string;
   log?: boolean;
@@ -210,7 +208,7 @@ export function axis(look: Look, plan: AxisPlan): object {
     axisLabel: {
       color: look.muted, hideOverlap: true,
       ...(type === 'value' || type === 'log' ? { formatter: (value: number) => number(value, 5) } : {}),
-      ...(type === 'time' ? { formatter: kTimeLabels } : {}),
+      ...(type === 'time' ? { formatter: timeLabel } : {}),
       ...(more.axisLabel as object | undefined),
     },
   };
