@@ -354,6 +354,7 @@ void ReportBuilder::addScenarios(const std::vector<std::string>& names, const st
   const int most = config_.task->shownRuns();
   if (most == 0 || data_.evaluations.numbers.size() < 2) return;
   OptionalSource<std::vector<ScenarioSeries>> source = readScenarios(filePrefix_);
+  if (!source.content && source.reason == std::strerror(ENOENT)) return;  // earlier versions wrote none
   if (!source.content) {
     note(fmt::format("The scenarios are not shown one beside another: {}: {}.", source.file, source.reason));
     return;
@@ -365,7 +366,21 @@ void ReportBuilder::addScenarios(const std::vector<std::string>& names, const st
     one.measure = pairName(config_.measures, shown[static_cast<std::size_t>(name - names.begin())]);
     data_.scenarioSeries.push_back(std::move(one));
   }
+  const auto isEarlier = [](const ScenarioSeries& one, const ScenarioSeries& other) {
+    return one.number < other.number;
+  };
+  std::stable_sort(data_.scenarioSeries.begin(), data_.scenarioSeries.end(), isEarlier);
   const std::vector<ResultRow>& rows = sources_.results.rows;
+  std::vector<int> lost;
+  for (const ResultRow& row : rows) {
+    const auto isOfRow = [&row](const ScenarioSeries& one) { return one.number == row.number; };
+    const bool isThere = std::any_of(data_.scenarioSeries.begin(), data_.scenarioSeries.end(), isOfRow);
+    if (row.ok && row.number <= most && !isThere) lost.push_back(row.number);
+  }
+  if (!lost.empty()) {
+    note(fmt::format("The series of scenario No. {} are not shown: {} does not have them.", fmt::join(lost, ", "),
+                     source.file));
+  }
   const auto more = std::count_if(rows.begin(), rows.end(), [most](const ResultRow& row) { return row.number > most; });
   if (more > 0) {
     note(fmt::format("The series of the first {} scenarios are shown one beside another; {} more {} left out.", most,
