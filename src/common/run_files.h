@@ -43,6 +43,7 @@ inline constexpr RunFile kTerminationLog{.stem = "_Termination", .extension = ".
 inline constexpr RunFile kMessages{.extension = "._spi_", .mark = ""};
 inline constexpr RunFile kKill{.extension = "._kill_", .mark = ""};
 inline constexpr RunFile kSeries{"_Series", ".dat"};
+inline constexpr RunFile kScenarioSeries{"_ScenarioSeries", ".dat"};
 inline constexpr RunFile kReport{
     .stem = "_Report", .extension = ".html", .mark = "content=\"default-src 'none'; script-src"};
 inline constexpr RunFile kBand{.stem = "_Band_", .extension = ".csv", .isNumbered = true, .mark = "# Band of "};

@@ -95,7 +95,7 @@ ModelRunner::ModelRunner(ModelDescription description, ParameterModel& parameter
       aggregator_(aggregator),
       launcher_(launcher),
       processFolderPrefix_(launcherSettings.processFolderPrefix),
-      shownRuns_(ToModelScale(parameters.searchSpace(), parameters.searchSpace().initial)) {
+      shownRuns_(ToModelScale(parameters.searchSpace(), parameters.searchSpace().initial), description_.shownRuns) {
   requireFilesInBaseFolder();
   LauncherSettings settings = launcherSettings;
   maxSeconds_ = settings.maxSeconds;

@@ -13,7 +13,7 @@ bool ShownRuns::mayBeShown(int slot, double aggregate) {
   const bool isInitial = initial_.consider(run.order, run.parameterValues);
   const bool mayBeBest = std::isnan(aggregate) || aggregate <= best_;
   if (aggregate < best_) best_ = aggregate;
-  return isInitial || mayBeBest;
+  return isInitial || mayBeBest || run.order <= firstRuns_;
 }
 
 }  // namespace mirevo

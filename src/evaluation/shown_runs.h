@@ -14,7 +14,9 @@ namespace mirevo {
 class ShownRuns final {
  public:
   /// `setupValues`: the initial values of the variable parameters, model scale.
-  explicit ShownRuns(std::vector<double> setupValues) : initial_(std::move(setupValues)) {}
+  /// `firstRuns`: so many of the process's first ones pass on theirs, whatever their results.
+  explicit ShownRuns(std::vector<double> setupValues, int firstRuns = 0)
+      : initial_(std::move(setupValues)), firstRuns_(firstRuns) {}
 
   /// A model run with these values (model scale) begins in the slot. To be called in the order of the evaluation
   /// numbers.
@@ -33,6 +35,7 @@ class ShownRuns final {
   InitialChoice initial_;
   std::map<int, Run> runs_;  ///< by slot
   int begun_ = 0;
+  int firstRuns_ = 0;
   double best_ = std::numeric_limits<double>::infinity();
 };
 

@@ -68,6 +68,8 @@ struct OutputMeasure {
   ObservationSelection selection = {};
   TimeMatching timeMatch = {};
   SeriesReference shownAbove = {};  ///< drawn above the hydrograph; without a file name: none
+  std::string displayName = {};  ///< of the quantity, for people; empty: the name of the observed item
+  std::string unit = {};         ///< of the values; empty: as the observed file says
 };
 
 /// Values of series in 32 bits, as the statistics of a run use them, or with all digits of their file.

@@ -10,7 +10,9 @@
 #include "evaluation/evaluation_result.h"
 #include "report/failure_reasons.h"
 #include "report/series_above.h"
+#include "report/series_labels.h"
 #include "run/results/run_record.h"
+#include "run/results/scenario_series.h"
 #include "run/results/series_table.h"
 
 namespace mirevo {
@@ -151,6 +153,9 @@ struct ReportData {
   std::int64_t periodLast = 0;
   SeriesTable series;
   std::vector<std::optional<SeriesAbove>> above;  ///< one per shown series, or none at all
+  std::vector<SeriesLabel> seriesLabels;  ///< one per series
+  std::vector<ScenarioSeries> scenarioSeries;
+  std::vector<std::string> runNames;  ///< of the evaluations, from the first on; empty where one has none
   std::vector<ReportedBand> bands;
   std::optional<ReportedSensitivity> sensitivity;
   std::vector<std::string> summary;  ///< the closing lines of the result file

@@ -1,12 +1,14 @@
 #include "report/report_json.h"
 
 #include <algorithm>
+#include <cmath>
 
 #include <fmt/core.h>
 
 #include "algorithms/numbers/sample_summary.h"
 #include "common/calendar.h"
 #include "measures/fit_figures.h"
+#include "report/drawn_lines.h"
 #include "report/hydrograph_views.h"
 #include "report/json_writer.h"
 #include "report/thinning.h"
@@ -72,6 +74,8 @@ void writeRun(JsonWriter& json, const ReportData& data) {
   } else {
     json.null();
   }
+  const auto isNamed = [](const std::string& name) { return !name.empty(); };
+  if (std::any_of(data.runNames.begin(), data.runNames.end(), isNamed)) json.member("runNames", data.runNames);
   json.member("notes", run.notes).endObject();
 }
 
@@ -153,10 +157,51 @@ void writeAbove(JsonWriter& json, const SeriesAbove& above) {
   json.key("values").numbers(above.series.values, Digits::drawn).member("thinned", above.isThinned).endObject();
 }
 
+void writeBreaks(JsonWriter& json, std::string_view name, const DrawnLine& line) {
+  if (line.breaks.empty()) return;
+  json.key(name).beginArray();
+  for (const std::int64_t second : line.breaks) json.integer(epochMilliseconds(second));
+  json.endArray();
+}
+
+void writeDrawnLines(JsonWriter& json, const ShownSeries& series) {
+  const DrawnLines lines = drawnLines(series);
+  json.member("observedAsPoints", lines.observed.isPoints);
+  json.key("breaks").beginObject();
+  writeBreaks(json, "observed", lines.observed);
+  writeBreaks(json, "initial", lines.initial);
+  writeBreaks(json, "best", lines.best);
+  json.endObject();
+}
+
+/// The series of each scenario beside those of a measure.
+void writeScenarios(JsonWriter& json, const ReportData& data, const std::string& measure) {
+  json.key("scenarios").beginArray();
+  for (const ScenarioSeries& one : data.scenarioSeries) {
+    if (one.measure != measure) continue;
+    const std::vector<float> none(one.series.values.size(), std::nanf(""));
+    ShownSeries shown{measure, one.series.seconds, none, none, one.series.values};
+    const DrawnLine line = drawnSimulated(shown.seconds, shown.best, shown.observed);
+    const std::size_t most = mostDrawnTimes(data.scenarioSeries.size());
+    if (shown.seconds.size() > most) shown = thinned(shown, most);
+    json.beginObject().member("number", one.number);
+    writeTimes(json, shown.seconds);
+    json.key("values").numbers(shown.best, Digits::drawn);
+    writeBreaks(json, "breaks", line);
+    json.endObject();
+  }
+  json.endArray();
+}
+
 void writeSeries(JsonWriter& json, const ReportData& data) {
   json.key("series").beginArray();
   for (const ShownSeries& series : data.series.series) {
-    json.beginObject().member("measure", series.measure).key("unit").null();
+    json.beginObject().member("measure", series.measure);
+    const auto place = static_cast<std::size_t>(&series - data.series.series.data());
+    if (place < data.seriesLabels.size()) {
+      json.optionalMember("quantity", data.seriesLabels[place].quantity);
+      json.optionalMember("unit", data.seriesLabels[place].unit);
+    }
     const std::size_t most = mostDrawnTimes(data.series.series.size());
     const bool isThinned = series.seconds.size() > most;
     const ShownSeries& drawn = isThinned ? thinned(series, most) : series;
@@ -173,8 +218,9 @@ void writeSeries(JsonWriter& json, const ReportData& data) {
     if (data.series.best) writeFigures(json, "best", fitFigures(series.best, series.observed));
     json.endObject().member("thinned", isThinned);
     if (isThinned) writeFlowDuration(json, series);
-    const auto index = static_cast<std::size_t>(&series - data.series.series.data());
-    if (index < data.above.size() && data.above[index]) writeAbove(json, *data.above[index]);
+    writeDrawnLines(json, series);
+    writeScenarios(json, data, series.measure);
+    if (place < data.above.size() && data.above[place]) writeAbove(json, *data.above[place]);
     writeHydrographViews(json, series, dateOfSecond(data.periodFirst)[date_field::kMonth]);
     json.endObject();
   }

@@ -66,6 +66,7 @@ class ReportBuilder final {
   void noteDifferencesOfBest();
   void addFailures();
   void addSeries();
+  void addScenarios(const std::vector<std::string>& names, const std::vector<std::size_t>& shown);
   void addAnalyses();
   void note(std::string sentence) { data_.run.notes.push_back(std::move(sentence)); }
 
@@ -182,6 +183,7 @@ void ReportBuilder::addRun() {
   run.algorithm = task.algorithm;
   run.populationSize = task.populationSize;
   run.surrogate = task.surrogate;
+  data_.runNames = task.runNames;
 }
 
 /// Bounds, period and all else that the setup says are those of the setup as it is now.
@@ -345,11 +347,13 @@ void ReportBuilder::addSeries() {
     return;
   }
   const std::vector<std::string> names = seriesNames(config_.measures, shown);
+  const std::vector<SeriesLabel> labels = seriesLabels(config_.measures, shown);
   std::vector<ShownSeries> series;
   for (std::size_t i = 0; i < shown.size(); ++i) {
     for (ShownSeries& read : data_.series.series) {
       if (read.measure != names[i]) continue;
       series.push_back(std::move(read));
+      data_.seriesLabels.push_back(labels[i]);
       series.back().measure = pairName(config_.measures, shown[i]);
       std::string fault;
       data_.above.push_back(seriesAbove(config_.measures, shown[i], series.back().seconds, fault));
@@ -358,6 +362,7 @@ void ReportBuilder::addSeries() {
     }
   }
   data_.series.series = std::move(series);
+  addScenarios(names, shown);
   if (!data_.series.initial) {
     note(fmt::format("The series of the initial evaluation are not shown: {} does not have them.", source.file));
   }
@@ -370,6 +375,45 @@ void ReportBuilder::addSeries() {
   } else {
     note(fmt::format("{}: the file of the series has not been written since evaluation {}, which is better, was found.",
                      shownAsBest, best_->number));
+  }
+}
+
+/// The series of successful scenarios, one beside another. `names`: of the measures `shown`, in the files of series.
+void ReportBuilder::addScenarios(const std::vector<std::string>& names, const std::vector<std::size_t>& shown) {
+  const int most = config_.task->shownRuns();
+  if (most == 0 || data_.evaluations.numbers.size() < 2) return;
+  OptionalSource<std::vector<ScenarioSeries>> source = readScenarios(filePrefix_);
+  if (!source.content && source.reason == std::strerror(ENOENT)) return;  // earlier versions wrote none
+  if (!source.content) {
+    note(fmt::format("The scenarios are not shown one beside another: {}: {}.", source.file, source.reason));
+    return;
+  }
+  for (ScenarioSeries& one : *source.content) {
+    const ResultRow* row = rowOf(one.number);
+    const auto name = std::find(names.begin(), names.end(), one.measure);
+    if (row == nullptr || !row->ok || name == names.end()) continue;
+    one.measure = pairName(config_.measures, shown[static_cast<std::size_t>(name - names.begin())]);
+    data_.scenarioSeries.push_back(std::move(one));
+  }
+  const auto isEarlier = [](const ScenarioSeries& one, const ScenarioSeries& other) {
+    return one.number < other.number;
+  };
+  std::stable_sort(data_.scenarioSeries.begin(), data_.scenarioSeries.end(), isEarlier);
+  const std::vector<ResultRow>& rows = sources_.results.rows;
+  std::vector<int> lost;
+  for (const ResultRow& row : rows) {
+    const auto isOfRow = [&row](const ScenarioSeries& one) { return one.number == row.number; };
+    const bool isThere = std::any_of(data_.scenarioSeries.begin(), data_.scenarioSeries.end(), isOfRow);
+    if (row.ok && row.number <= most && !isThere) lost.push_back(row.number);
+  }
+  if (!lost.empty()) {
+    note(fmt::format("The series of scenario No. {} are not shown: {} does not have them.", fmt::join(lost, ", "),
+                     source.file));
+  }
+  const auto more = std::count_if(rows.begin(), rows.end(), [most](const ResultRow& row) { return row.number > most; });
+  if (more > 0) {
+    note(fmt::format("The series of the first {} scenarios are shown one beside another; {} more {} left out.", most,
+                     more, more == 1 ? "is" : "are"));
   }
 }
 

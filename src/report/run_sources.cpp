@@ -152,6 +152,11 @@ OptionalSource<RestartSettings> readSettings(const std::string& filePrefix, cons
   return source;
 }
 
+OptionalSource<std::vector<ScenarioSeries>> readScenarios(const std::string& filePrefix) {
+  return readSource<std::vector<ScenarioSeries>>(runFilePath(filePrefix, run_files::kScenarioSeries),
+                                                 readScenarioSeries);
+}
+
 OptionalSource<SeriesTable> readSeries(const std::string& filePrefix) {
   return readSource<SeriesTable>(runFilePath(filePrefix, run_files::kSeries), readSeriesTable);
 }

@@ -11,6 +11,7 @@
 #include "run/results/result_table.h"
 #include "run/results/row_check.h"
 #include "run/results/run_record.h"
+#include "run/results/scenario_series.h"
 #include "run/results/series_table.h"
 #include "run/setup/run_config.h"
 
@@ -48,5 +49,6 @@ OptionalSource<PairsByNumber> readPairs(const std::string& filePrefix, const Res
 /// The settings with which the results were computed.
 OptionalSource<RestartSettings> readSettings(const std::string& filePrefix, const ResultFileNames& names);
 OptionalSource<SeriesTable> readSeries(const std::string& filePrefix);
+OptionalSource<std::vector<ScenarioSeries>> readScenarios(const std::string& filePrefix);
 
 }  // namespace mirevo

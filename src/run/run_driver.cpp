@@ -254,6 +254,9 @@ void RunDriver::openResults() {
   series_ = openSeries(config_, parameters_->searchSpace(), runner_->output(),
                        runFilePath(filePrefix_, run_files::kSeries), earlier != nullptr, state_.log);
   if (series_) reporter_->recordSeries(*series_);
+  scenarioSeries_ = openScenarioSeries(config_, runner_->output(), runFilePath(filePrefix_, run_files::kScenarioSeries),
+                                       earlier != nullptr, state_.log);
+  if (scenarioSeries_) reporter_->recordScenarios(*scenarioSeries_);
   failedRunPolicy_.emplace(config_.plannedEvaluations(), config_.failedRunFolders);
   if (state_.job->hasWorkers()) {
     evaluator_ = std::make_unique<RankEvaluator>(*runner_, *state_.job, *reporter_, *failedRunPolicy_, earlier);

@@ -104,6 +104,7 @@ class RunDriver final {
   std::unique_ptr<ObjectiveAggregator> aggregator_;
   std::optional<RunResults> results_;
   std::unique_ptr<SeriesRecorder> series_;
+  std::unique_ptr<ScenarioSeriesFile> scenarioSeries_;
   std::unique_ptr<RunReporter> reporter_;
   std::optional<FailedRunPolicy> failedRunPolicy_;
   std::unique_ptr<ProcessLauncher> launcher_;

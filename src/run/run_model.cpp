@@ -29,6 +29,7 @@ ModelDescription describeModel(const RunConfig& config) {
   model.isForRuns = config.task != nullptr;
   model.computeExactMeasures = config.usesExactMeasures();
   model.keepSimulatedValues = config.keepsSimulatedValues();
+  if (config.task) model.shownRuns = config.task->shownRuns();
   if (config.task) model.keptPrecision = config.task->keptPrecision();
   if (config.task) model.keptSteps = config.task->keptSteps();
   return model;

@@ -282,6 +282,7 @@ void RunReporter::count(const std::vector<double>& parameterValues, const Evalua
 
 void RunReporter::recordSeries(const std::vector<double>& values, const EvaluationResult& result) {
   if (recorder_ != nullptr) recorder_->evaluationFinished(result, values, best());
+  if (scenarioSeries_ != nullptr) scenarioSeries_->add(result.number, result.shownSeries);
 }
 
 std::string RunReporter::valuesText(const EvaluationResult& result) const {

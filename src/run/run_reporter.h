@@ -17,6 +17,7 @@
 #include "run/results/pairs_file.h"
 #include "run/results/restart.h"
 #include "run/results/result_file.h"
+#include "run/results/scenario_series.h"
 #include "run/results/series_recorder.h"
 #include "run/results/simulated_values_file.h"
 #include "run/results/unkept_files.h"
@@ -36,6 +37,7 @@ class RunReporter final : public EvaluationObserver {
 
   /// From now on `recorder` records the series of the initial and the best evaluation; it must outlive the reporter.
   void recordSeries(SeriesRecorder& recorder) { recorder_ = &recorder; }
+  void recordScenarios(ScenarioSeriesFile& file) { scenarioSeries_ = &file; }
 
   /// From now on `settings` are on disk whenever a row is written; they must outlive the reporter.
   void keepSettings(RestartSettingsFile& settings) { settings_ = &settings; }
@@ -118,6 +120,7 @@ class RunReporter final : public EvaluationObserver {
   UnkeptFiles* unkeptFiles_;
   std::vector<MeasureSource> sources_;
   SeriesRecorder* recorder_ = nullptr;
+  ScenarioSeriesFile* scenarioSeries_ = nullptr;
   RestartSettingsFile* settings_ = nullptr;
   BestChoice best_;
   InitialChoice initial_;

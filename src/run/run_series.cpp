@@ -56,6 +56,24 @@ std::vector<KeptSeries> keptSeries(const RunConfig& config, const OutputReader& 
 
 }  // namespace
 
+std::unique_ptr<ScenarioSeriesFile> openScenarioSeries(const RunConfig& config, OutputReader& output,
+                                                       const std::string& path, bool goesOn, RunLog& log) {
+  if (!config.task || config.task->shownRuns() == 0 || output.shownMeasures().empty()) return nullptr;
+  if (!goesOn) keepEarlierResults(std::array{path}, config.setupFile, log);
+  ScenarioSeriesFile::Settings settings;
+  settings.path = path;
+  settings.headLines = {columnName(config.title), fmt::format("Mirevo {}", programVersion()),
+                        "Setup file: " + config.setupFile};
+  settings.measures = seriesNames(config.measures, output.shownMeasures());
+  settings.periodFirst = secondNumber(config.period.start);
+  settings.periodLast = secondNumber(config.period.end);
+  settings.mostRuns = config.task->shownRuns();
+  auto file =
+      std::make_unique<ScenarioSeriesFile>(std::move(settings), [&log](std::string_view text) { log.warning(text); });
+  file->begin(goesOn);
+  return file;
+}
+
 std::unique_ptr<SeriesRecorder> openSeries(const RunConfig& config, const SearchSpace& space, OutputReader& output,
                                            const std::string& path, bool goesOn, RunLog& log) {
   if (!goesOn) keepEarlierResults(std::array{path}, config.setupFile, log);

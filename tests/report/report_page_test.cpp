@@ -1,3 +1,4 @@
+#include <algorithm>
 #include <cmath>
 #include <limits>
 
@@ -5,6 +6,7 @@
 #include <gtest/gtest.h>
 
 #include "common/calendar.h"
+#include "report/drawn_lines.h"
 #include "report/json_writer.h"
 #include "report/report_file.h"
 #include "report/report_json.h"
@@ -111,6 +113,46 @@ TEST(ReportPage, TimesAreAStepWhereTheyAreRegularAndALongSeriesIsThinnedForDrawi
   EXPECT_EQ(curve.front(), 99.0);
   EXPECT_EQ(curve[curve.size() / 2], 49.0);
   EXPECT_EQ(curve.back(), 0.0);
+}
+
+TEST(DrawnLines, AreInterruptedInGapsAndDotsWhereValuesAreUneven) {
+  struct Case {
+    std::vector<int> simulated;  // hours of the rows with a simulated value
+    std::vector<int> observed;
+    bool isPoints;
+    std::vector<std::int64_t> breaks;  // of the observations, in hours
+    std::vector<std::int64_t> simulatedBreaks;
+  };
+  const std::vector<int> hours{0, 1, 2, 3, 4, 5, 6, 7, 8, 9, 60, 61, 62, 63};
+  const Case cases[] = {
+      {hours, {0, 3, 6, 9, 60, 63}, false, {9}, {9}},                   // even, with the model's gap
+      {hours, {0, 1, 2, 4, 5, 6, 7}, false, {2}, {9}},                  // one of them is missing
+      {hours, {0, 1, 7, 60, 63}, true, {}, {9}},                        // samples
+      {{0, 24, 48, 72, 96}, {0, 24, 48, 72, 96}, false, {}, {}},        // all days
+      {{0, 24, 48, 72, 96, 120, 144}, {0, 48, 96, 144}, true, {}, {}},  // the model steps between them
+      {{0, 24, 48, 50, 72, 96, 120}, {48, 50}, true, {}, {}},           // an interpolated value is no step of the model
+  };
+  for (const Case& each : cases) {
+    ShownSeries series;
+    for (int hour = 0; hour < 200; ++hour) {
+      const auto valueIf = [hour](const std::vector<int>& there) {
+        return std::find(there.begin(), there.end(), hour) == there.end() ? std::nanf("") : 1.0F;
+      };
+      if (std::isnan(valueIf(each.simulated))) continue;
+      series.seconds.push_back(3600 * hour);
+      series.observed.push_back(valueIf(each.observed));
+      series.best.push_back(1.0F);
+      series.initial.push_back(std::nanf(""));
+    }
+    const DrawnLines lines = drawnLines(series);
+    const auto hoursOf = [](std::vector<std::int64_t> seconds) {
+      for (std::int64_t& second : seconds) second /= 3600;
+      return seconds;
+    };
+    EXPECT_EQ(lines.observed.isPoints, each.isPoints);
+    EXPECT_EQ(hoursOf(lines.observed.breaks), each.breaks);
+    EXPECT_EQ(hoursOf(lines.best.breaks), each.simulatedBreaks);
+  }
 }
 
 }  // namespace

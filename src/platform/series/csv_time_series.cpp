@@ -187,6 +187,7 @@ bool CsvTimeSeries::readHeader(std::string_view line) {
     cell = csv::endOfCell(begin, end, separator_);
     if (items_.size() == kMostItems) return fail(begin, fmt::format("at most {} items", kMostItems), "more");
     items_.push_back({std::string(csv::cellText(begin, cell))});
+    items_.back().unit = splitUnit(items_.back().name).second;
   }
   return true;
 }

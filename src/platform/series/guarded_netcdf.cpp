@@ -16,7 +16,10 @@ bool GuardedNetcdf::open(const std::string& fileName) {
   if (!content) return false;
   if (content->start) startSecond_ = secondNumber(*content->start);
   times_ = std::move(content->times);
-  for (std::string& name : content->names) items_.push_back({std::move(name)});
+  for (std::size_t i = 0; i < content->names.size(); ++i) {
+    items_.push_back({std::move(content->names[i])});
+    items_.back().unit = std::move(content->units[i]);
+  }
   units_.assign(items_.size(), {});
   read_.resize(items_.size());
   auto next = content->items.begin();

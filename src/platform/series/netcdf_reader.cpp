@@ -14,6 +14,8 @@
 namespace mirevo {
 namespace {
 
+constexpr std::size_t kLongestUnit = 400;  ///< so that names and units are no nonsense to the program
+
 /// Followed by the path and the numbers of the items.
 struct Request {
   std::uint64_t pathLength = 0;
@@ -90,7 +92,9 @@ class Service final {
     {
       NetcdfTimeSeries file;
       if (!file.open(path)) return refuse(file.lastError());
-      for (int item = 1; item <= file.itemCount(); ++item) names += file.itemName(item) + '\0';
+      for (int item = 1; item <= file.itemCount(); ++item) {
+        names += file.itemName(item) + '\0' + file.itemUnit(item).substr(0, kLongestUnit) + '\0';
+      }
       for (const int item : items) {
         if (item < 1 || item > file.itemCount()) continue;
         const auto place = static_cast<std::size_t>(item - 1);
@@ -235,9 +239,11 @@ std::optional<NetcdfReader::Content> NetcdfReader::readOnce(const std::string& p
     return std::nullopt;
   for (std::size_t begin = 0; begin < names.size();) {
     const std::size_t end = names.find('\0', begin);
-    content.names.push_back(names.substr(begin, end - begin));
+    std::vector<std::string>& texts = content.names.size() == content.units.size() ? content.names : content.units;
+    texts.push_back(names.substr(begin, end - begin));
     begin = end == std::string::npos ? end : end + 1;
   }
+  content.units.resize(content.names.size());
   for (std::uint64_t i = 0; i < answer.itemCount; ++i) {
     ItemAnswer head;
     Item& item = content.items.emplace_back();

@@ -28,6 +28,7 @@ class NetcdfReader final {
     std::optional<DateRecord> start;
     std::vector<double> times;
     std::vector<std::string> names;  ///< of all items
+    std::vector<std::string> units;  ///< of their values, one per item; empty where the file says none
     std::vector<Item> items;         ///< those that were asked for
   };
 

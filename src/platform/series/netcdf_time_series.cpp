@@ -332,9 +332,11 @@ bool NetcdfTimeSeries::findItems(int timeVariable) {
       return fail(
           fmt::format("expected at most {} items, found more at variable \"{}\"", kMostNetcdfItems, variable->name));
     }
+    const std::string unit = textAttribute(file_, id, "units");
     for (place.station = 0; place.station < stations; ++place.station) {
       places_.push_back(place);
       items_.push_back({variable->name});
+      items_.back().unit = unit;
       if (place.stationPosition >= 0) items_.back().name += fmt::format("[{}]", place.station + 1);
     }
   }

@@ -16,6 +16,10 @@ std::string StoredTimeSeries::itemName(int item) const {
   return hasItem(item) ? items_[static_cast<std::size_t>(item - 1)].name : std::string();
 }
 
+std::string StoredTimeSeries::itemUnit(int item) const {
+  return hasItem(item) ? items_[static_cast<std::size_t>(item - 1)].unit : std::string();
+}
+
 bool StoredTimeSeries::getData(int item) {
   if (!hasItem(item)) {
     lastError_ = sourceName() + ": no item " + std::to_string(item);

@@ -16,6 +16,7 @@ class StoredTimeSeries : public TimeSeriesObject {
   std::optional<DateRecord> startTime() const final;
   int itemCount() const final { return static_cast<int>(items_.size()); }
   std::string itemName(int item) const final;
+  std::string itemUnit(int item) const final;
   bool getData(int item) final;
   int timeStepCount() const final { return static_cast<int>(times_.size()); }
   std::span<const double> times() const final { return times_; }
@@ -28,6 +29,7 @@ class StoredTimeSeries : public TimeSeriesObject {
     std::string name;
     std::vector<float> values = {};  ///< one per time step; empty until getData()
     std::vector<double> exact = {};  ///< one per time step; empty until exactValues()
+    std::string unit = {};
   };
 
   /// Reads the values of an item, given by its 0-based index; false, with lastError_ set and no values, when that

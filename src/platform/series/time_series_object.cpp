@@ -119,6 +119,17 @@ std::unique_ptr<TimeSeriesObject> createTimeSeriesObject(const std::string& file
   return nullptr;
 }
 
+std::pair<std::string, std::string> splitUnit(std::string_view name) {
+  const std::string_view text = trim(name);
+  const char closing = text.empty() ? '\0' : text.back();
+  const std::size_t begin = closing == ']'   ? text.rfind('[')
+                            : closing == ')' ? text.rfind('(')
+                                             : std::string_view::npos;
+  if (begin == std::string_view::npos || begin == 0) return {std::string(text), {}};
+  const std::string_view unit = trim(text.substr(begin + 1, text.size() - begin - 2));
+  return {std::string(trim(text.substr(0, begin))), std::string(unit)};
+}
+
 std::optional<float> valueAt(const TimeSeriesObject& series, int item, double days, std::size_t& hint,
                              double largestGap) {
   return interpolate(series.times(), series.values(item), series.deleteValue(), days, largestGap, hint);

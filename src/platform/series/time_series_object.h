@@ -6,6 +6,8 @@
 #include <optional>
 #include <span>
 #include <string>
+#include <string_view>
+#include <utility>
 #include <vector>
 
 #include "common/date_record.h"
@@ -36,6 +38,8 @@ class TimeSeriesObject {
   virtual bool endsLine() const { return true; }
   virtual int itemCount() const = 0;
   virtual std::string itemName(int item) const = 0;
+  /// In which the file says that its values are, "m3/s"; empty where it does not.
+  virtual std::string itemUnit(int /*item*/) const { return {}; }
   /// What in the open file seems to be meant in another way than it is read, one warning each.
   virtual std::vector<std::string> doubts() const { return {}; }
 
@@ -62,6 +66,10 @@ std::unique_ptr<TimeSeriesObject> createTimeSeriesObject(const std::string& file
                                                          std::shared_ptr<SeriesReading> reading = nullptr);
 /// Whether a series file of this name is text, all of which is read into memory.
 bool isTextSeries(const std::string& fileName);
+
+/// A name with its unit in brackets at the end, "Discharge [m3/s]" or "Discharge (m3/s)", in two parts; the second is
+/// empty where there are none.
+std::pair<std::string, std::string> splitUnit(std::string_view name);
 
 /// Half a millisecond, in days. Times that are closer are the same time: this is far above the rounding of days in 64
 /// bits over thousands of years and far below any time step.

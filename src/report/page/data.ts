@@ -25,6 +25,7 @@ export interface Run {
   populationSize: number | null;
   period: [string, string] | null;
   seed: number | null;
+  runNames?: string[]; // of the evaluations, from the first on; empty where one has none
   notes: string[];
 }
 
@@ -117,14 +118,25 @@ export interface FlowDuration {
   best?: Maybe[];
 }
 
+/** The simulated series of a scenario at its own times. */
+export interface Scenario extends Times {
+  number: number;
+  values: Maybe[];
+  breaks?: number[];
+}
+
 /** A simulated and an observed series. */
 export interface Series extends Times {
   measure: string; // names of all measures that compare the two
+  quantity?: string | null; // what the values are
   unit: string | null;
+  scenarios?: Scenario[];
   observed: Maybe[];
   initial?: Maybe[];
   best?: Maybe[];
   bestNumber?: number | null;
+  observedAsPoints?: boolean; // too few or too uneven for a line
+  breaks?: { [column: string]: number[] }; // milliseconds of the values behind which a line is interrupted, per column
   period?: [number, number] | null;
   thinned?: boolean; // reduced to the extremes of short spans; figures and `flowDuration` are computed from all values
   flowDuration?: FlowDuration;

@@ -136,17 +136,10 @@ std::vector<std::string> RunResults::pathsBesideResults() const {
 
 void RunResults::requireReplaceableFiles(const RunConfig& config) const {
   if (!config.task) return;
-  std::vector<RunFile> files{names_.results,
-                             names_.restart,
-                             names_.simulatedValues,
-                             names_.record,
-                             names_.failures,
-                             names_.pairs,
-                             names_.checksums,
-                             run_files::kSeries,
-                             run_files::kReport,
-                             run_files::kSavedFolder,
-                             run_files::kOwnFailedRuns,
+  std::vector<RunFile> files{names_.results,     names_.restart,          names_.simulatedValues,
+                             names_.record,      names_.failures,         names_.pairs,
+                             names_.checksums,   run_files::kSeries,      run_files::kScenarioSeries,
+                             run_files::kReport, run_files::kSavedFolder, run_files::kOwnFailedRuns,
                              names_.unkept};
   files.insert(files.end(), names_.tables.begin(), names_.tables.end());
   for (const RunFile& file : files) requireReplaceable(runFilePath(filePrefix_, file), file);

@@ -325,6 +325,18 @@ const SettingSection<OutputMeasure>& measureSection() {
        "A comparison of a simulated with an observed series reduced to one number, or a number that the model wrote.",
        {setting<&Measure::name>(
             {.name = "Name", .type = KeywordType::name, .meaning = "Name, in messages and result files."}),
+        setting<&Measure::displayName>({.name = "Display_Name",
+                                        .type = KeywordType::freeText,
+                                        .defaultValue = "''",
+                                        .meaning = "What the values are, at the axes of the report. Without it, the "
+                                                   "name of the item in the observed file.",
+                                        .bearsOnResults = kNotOfResults}),
+        setting<&Measure::unit>({.name = "Unit",
+                                 .type = KeywordType::freeText,
+                                 .defaultValue = "''",
+                                 .meaning = "Unit of the values, in the report. Without it, the one that the observed "
+                                            "file has for the item: behind its name in brackets, or as its `units`.",
+                                 .bearsOnResults = kNotOfResults}),
         setting<&Measure::interfaceType>(
             {.name = "Interface_Type",
              .defaultValue = "0",

@@ -4,6 +4,7 @@
 
 #include "common/fatal_error.h"
 #include "common/text.h"
+#include "run/tasks/analysis_names.h"
 #include "run/tasks/infeasible_sets.h"
 #include "run/tasks/off_grid.h"
 
@@ -39,13 +40,28 @@ const SettingSection<ScenarioRun>& runSection() {
       {"SCENARIOS/SCENARIO_RUNS/SCENARIO_n",
        "for each item",
        "A run.",
-       {setting<&ScenarioRun::values>({.name = kValuesKeyword,
+       {setting<&ScenarioRun::name>({.name = "Name",
+                                     .type = KeywordType::freeText,
+                                     .defaultValue = "''",
+                                     .meaning = "What the run is called in the log, in the closing lines of the "
+                                                "result file and in the report.",
+                                     .bearsOnResults = kNotOfResults}),
+        setting<&ScenarioRun::values>({.name = kValuesKeyword,
                                        .unit = "of the parameters",
                                        .meaning =
                                            "One value per parameter in the order of `MODEL_PARAMETERS`, those of "
                                            "variable parameters within their bounds; those of fixed and dependent "
                                            "ones are read and not used."})}}};
   return section;
+}
+
+/// "Scenario 1: dry"; none if no run has a name.
+std::vector<std::string> nameLines(std::span<const ScenarioRun> runs) {
+  std::vector<std::string> lines;
+  for (std::size_t i = 0; i < runs.size(); ++i) {
+    if (!runs[i].name.empty()) lines.push_back(fmt::format("Scenario {}: {}", i + 1, columnName(runs[i].name)));
+  }
+  return lines;
 }
 
 /// Checks the values of one run against the parameters.
@@ -135,6 +151,20 @@ std::string ScenarioTask::description() const {
                                                   : "Scenario runs: Multiple runs";
 }
 
+std::vector<std::string> ScenarioTask::summaryLines(const SearchSpace& /*space*/) const {
+  return nameLines(settings.runs);
+}
+
+int ScenarioTask::shownRuns() const {
+  return settings.type == ScenarioType::singleRun ? 0 : kMostShownScenarios;
+}
+
+TaskReport ScenarioTask::report() const {
+  TaskReport report;
+  for (const ScenarioRun& run : settings.runs) report.runNames.push_back(run.name);
+  return report;
+}
+
 int ScenarioTask::plannedEvaluations() const {
   return settings.type == ScenarioType::singleRun ? 1 : static_cast<int>(settings.runs.size());
 }
@@ -145,7 +175,9 @@ TaskOutcome ScenarioTask::run(const TaskContext& context) {
                                              : scenarioSets(settings.runs, context.parameters);
   warnOfInfeasibleSets(context, sets, "scenarios", static_cast<int>(sets.size()));
   context.evaluator.evaluateParameterSets(sets, DispatchMode::task);
-  return {std::string(kEndOfTask)};
+  TaskOutcome outcome{std::string(kEndOfTask), nameLines(settings.runs)};
+  if (!outcome.report.empty()) logReport(context, outcome.report);
+  return outcome;
 }
 
 std::vector<ParameterSet> scenarioSets(std::span<const ScenarioRun> runs, std::span<const ModelParameter> parameters) {

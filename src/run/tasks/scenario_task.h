@@ -6,9 +6,13 @@ namespace mirevo {
 
 enum class ScenarioType : std::int32_t { singleRun = 0, multipleRuns = 1 };
 
+/// Scenarios whose series are kept and shown one beside another, the first ones.
+inline constexpr int kMostShownScenarios = 20;
+
 /// One run of the list.
 struct ScenarioRun {
   std::vector<double> values;  ///< one per model parameter, model scale
+  std::string name = {};       ///< for people; may be empty
 };
 
 struct ScenarioSettings {
@@ -25,6 +29,9 @@ class ScenarioTask final : public Task {
   void read(const TaskReading& reading) override;
   std::vector<double> givenValues(std::size_t parameter) const override;
   std::string description() const override;
+  std::vector<std::string> summaryLines(const SearchSpace& space) const override;
+  int shownRuns() const override;
+  TaskReport report() const override;
   int plannedEvaluations() const override;
   TaskOutcome run(const TaskContext& context) override;
 

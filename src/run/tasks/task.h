@@ -99,6 +99,7 @@ struct TaskReport {
   int populationSize = 0;                            ///< 0: none
   bool hasBands = false;                             ///< it writes bands of simulated series
   const SensitivitySettings* sensitivity = nullptr;  ///< for a local sensitivity analysis, else null
+  std::vector<std::string> runNames = {};  ///< of the evaluations, from the first on; empty where one has none
 };
 
 /// Why more than one slot is refused.
@@ -149,6 +150,8 @@ class Task {
   /// Whether it uses them at the simulated steps, too.
   virtual std::optional<KeptSteps> keptSteps() const { return std::nullopt; }
   virtual SeriesPrecision keptPrecision() const { return SeriesPrecision::single; }
+  /// How many of its evaluations, the first ones, are shown with their series one beside another; 0: none.
+  virtual int shownRuns() const { return 0; }
   /// Whether it uses the output measures in 64 bits, which the results then must hold.
   virtual bool usesExactMeasures() const { return false; }
   /// Empty if its batches fill several slots.

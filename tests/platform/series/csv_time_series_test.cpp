@@ -97,6 +97,8 @@ TEST(CsvTimeSeries, ReadsAColumnOnlyWhenItIsAskedFor) {
                            "2001-01-02,2,\"x,y\",4,-3.5e38\n"));
   ASSERT_EQ(series.itemCount(), 4);
   EXPECT_EQ(series.itemName(2), "flag, quality");
+  EXPECT_EQ(splitUnit(" Q at A (1) [m3/s] "), std::pair(std::string("Q at A (1)"), std::string("m3/s")));
+  EXPECT_EQ(splitUnit("[1]"), std::pair(std::string("[1]"), std::string()));
   EXPECT_FALSE(series.getData(2));
   EXPECT_EQ(series.lastError(),
             "s.csv:2:14: expected a number of at most 3.4028235e38 in size, an empty cell, NaN or NA, found \"A:e\"");

@@ -110,6 +110,7 @@ void expectSameGuarded(const std::string& path) {
     ASSERT_EQ(guarded.itemCount(), series.itemCount());
     for (int item = 0; item <= series.itemCount() + 1; ++item) {
       EXPECT_EQ(guarded.itemName(item), series.itemName(item));
+      EXPECT_EQ(guarded.itemUnit(item), series.itemUnit(item));
       EXPECT_EQ(guarded.getData(item), series.getData(item));
       EXPECT_EQ(guarded.lastError(), series.lastError());
       EXPECT_THAT(guarded.values(item), ::testing::Pointwise(NanSensitiveFloatEq(), series.values(item)));
@@ -138,7 +139,7 @@ TEST(NetcdfTimeSeries, ReadsVariablesStationsAndPacking) {
     file.number(stage, "missing_value", NC_SHORT, 7);
     file.number(stage, "scale_factor", NC_DOUBLE, 0.5);
     file.number(stage, "add_offset", NC_DOUBLE, 100.0);
-    file.variable("count", NC_INT, {time}, {5, 6, 7});
+    file.text(file.variable("count", NC_INT, {time}, {5, 6, 7}), "units", "m3 s-1");
     file.close();
 
     NetcdfTimeSeries series;
@@ -147,7 +148,8 @@ TEST(NetcdfTimeSeries, ReadsVariablesStationsAndPacking) {
     EXPECT_THAT(timesOf(series), ElementsAre(0.0, 0.25, 1.25));
     ASSERT_EQ(series.itemCount(), 5);
     EXPECT_EQ(series.itemName(2), "flow[2]");
-    EXPECT_EQ(series.itemName(5), "count");
+    EXPECT_EQ(series.itemName(5) + " " + series.itemUnit(5), "count m3 s-1");
+    EXPECT_EQ(series.itemUnit(2), "");
     EXPECT_THAT(valuesOf(series, 1), ElementsAre(1.0F, -999999.0F, 3.0F));
     EXPECT_THAT(valuesOf(series, 2), ElementsAre(10.0F, 20.0F, 30.0F));
     EXPECT_THAT(valuesOf(series, 3), ElementsAre(101.0F, 102.0F, -999999.0F));

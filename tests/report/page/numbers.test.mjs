@@ -12,6 +12,8 @@ async function load(file) {
   return import(`data:text/javascript;base64,${Buffer.from(outputFiles[0].text).toString('base64')}`);
 }
 const numbers = await load('numbers.ts');
+const lines = await load('lines.ts');
+const ticks = await load('ticks.ts');
 const format = await load('format.ts');
 
 test('numbers derived from evaluations', () => {
@@ -50,6 +52,16 @@ test('thinning keeps the reach of the points and no more than its cells', () => 
   assert.deepEqual(numbers.thin([1, 1, 2, null], [1, 1, 900, 1], 10, 10, 100), [0], 'above the top nothing is drawn');
   assert.equal(numbers.axisTop(Array.from({ length: 100 }, (_, index) => index)), Infinity);
   assert.ok(numbers.axisTop([...Array.from({ length: 100 }, (_, index) => index), 1e6]) < 200);
+});
+
+test('lines and ticks that a reader can tell', () => {
+  const { times, values, dots } = lines.lineOf([0, 1, 2, 3, 10, 20, 21], [1, null, 2, 3, 4, 5, 6], [3, 10]);
+  assert.deepEqual([times, values], [[0, 2, 3, 6.5, 10, 15, 20, 21], [1, 2, 3, null, 4, null, 5, 6]]);
+  assert.deepEqual(dots, [[10, 4]], 'a value alone');
+  assert.deepEqual([0, 6, 14].map((time) => lines.nearest([0, 5, 9], time)), [0, 1, 2]);
+  assert.deepEqual(ticks.logTicks(4, 9), [4, 5, 6, 7, 8, 9]);
+  assert.deepEqual(ticks.logTicks(0.9, 2000), [1, 10, 100, 1000]);
+  assert.deepEqual(ticks.logTicks(0, 1), []);
 });
 
 test('numbers as they are written', () => {

@@ -51,7 +51,7 @@ const cases = {
     kOptimisation.filter((id) => id !== 'failures')],
   'an uncertainty analysis': [sample.dataOf('uncertainty'), 1 + 3 + 1 + 5 + 2, ['band', 'series', 'parameters', 'results', 'progress', 'distributions', 'dotty', 'failures', 'run', 'summary']],
   'a sensitivity analysis': [sample.dataOf('sensitivity'), 4 + 3, ['sensitivity', 'series', 'parameters', 'results', 'run', 'summary']],
-  'scenario runs': [sample.dataOf('scenarios'), 3 + 1 + 2, ['series', 'parameters', 'results', 'progress', 'dotty', 'run', 'summary']],
+  'scenario runs': [sample.dataOf('scenarios'), 4 + 1 + 2, ['series', 'parameters', 'results', 'progress', 'dotty', 'run', 'summary']],
   'a run without an evaluation': [sample.empty(), 0, ['run']],
   'a run whose evaluations all failed': [sample.dataOf('allFailed'), 0, ['parameters', 'results', 'failures', 'run', 'summary']],
   'a search with hostile names': [sample.hostile(sample.dataOf('optimisation')), 3 + 2 + 2 + 2 + 2, kOptimisation, true],
@@ -168,6 +168,24 @@ test('of many charts those in view are drawn, the others when they come into vie
     new Set(new Uint32Array(picture.getContext('2d').getImageData(0, 0, picture.width, picture.height).data.buffer)).size < 10).length);
   assert.deepEqual([await page.locator('figure canvas.picture').count(), blank], [all, 0]);
   await page.context().close();
+});
+
+test('observations between the steps of a model, scenarios, axes and further measures', async () => {
+  const data = sample.hourlyScenarios();
+  await withReport(data, {}, async (page) => {
+    const drawn = (index) => page.evaluate((at) => window.drawnOptions(document.querySelectorAll('#series figure')[at]), index);
+    const scenarios = await drawn(0);
+    assert.ok(scenarios.series.length > 20);
+    assert.equal(scenarios.series[1].name, 'dry year (2)');
+    const { series, yAxis } = await drawn(1);
+    assert.equal(yAxis[0].name, 'Discharge [m3/s]');
+    const [line, dots] = series.filter(({ name }) => name === 'observed');
+    assert.deepEqual(line.data.map(([, value]) => value === null).slice(0, 5), [false, false, false, true, false], 'interrupted once');
+    assert.equal(dots.data.length, line.data.length - 1);
+    assert.match(await page.locator('.findings details').textContent(), /2 more series: .*gauge 5.*gauge 6/);
+    const ranking = await page.locator('[aria-label="Best evaluations"] tbody th').allTextContents();
+    assert.equal(ranking.filter((text) => [String(data.best.number), '30'].includes(text)).length, 1, `a set is listed once: ${ranking}`);
+  });
 });
 
 test('20 000 evaluations and 20 years of days are drawn thinned and counted in full', async (context) => {

@@ -39,6 +39,22 @@ export function manyParameters(count) {
   return data;
 }
 
+/** Scenarios, the second with a name, of a model of hourly steps, with observations of some days and a gap. */
+export function hourlyScenarios() {
+  const data = dataOf('scenarios');
+  const [series] = data.series;
+  const times = series.observed.map((_, place) => Date.UTC(2001, 2, 30) + place * 3600000);
+  const daily = series.observed.map((value, place) => (place % 24 === 0 && place !== 72 ? value ?? 1 : null));
+  Object.assign(series, { times, observed: daily, observedAsPoints: false, breaks: { observed: [times[48]] }, quantity: 'Discharge', unit: 'm3/s', period: [times[0], times.at(-1)] });
+  series.flowDuration = undefined;
+  series.scenarios.forEach((one) => Object.assign(one, { times: times.slice(0, one.values.length) }));
+  data.run.runNames = ['', 'dry year'];
+  const best = data.best.number - 1; // and again as the last one, as after a search
+  for (const column of [data.evaluations.aggregate, ...data.evaluations.parameters]) column[29] = column[best];
+  for (let more = 1; more < 7; ++more) data.series.push({ ...series, measure: `gauge ${more}`, scenarios: [] });
+  return data;
+}
+
 /** A search as if it had made `count` evaluations, each time round a little further on, against `days` of daily series. */
 export function stretched(count, days) {
   const data = dataOf('optimisation');

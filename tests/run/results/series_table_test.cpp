@@ -7,6 +7,8 @@
 
 #include "common/calendar.h"
 #include "matchers.h"
+#include "run/results/scenario_series.h"
+#include "temporary_folder.h"
 
 namespace mirevo {
 namespace {
@@ -57,6 +59,33 @@ TEST(SeriesTable, TakesAnyTextAndKeepsWholeRowsOnly) {
         "a\t2001-01-01T00:00:00\t\t2\t3"}) {
     EXPECT_THAT(readSeriesTable(header + row + "\n").series, IsEmpty()) << row;
   }
+}
+
+TEST(ScenarioSeriesFile, KeepsWholeScenariosOfThePeriodAndGoesOnFromThem) {
+  const TemporaryFolder folder;
+  const std::string path = folder.write("s.dat", "");
+  std::vector<std::string> warnings;
+  const auto open = [&] {
+    return ScenarioSeriesFile({path, {"title", "Mirevo"}, {"flow"}, 3600, 7200, 2},
+                              [&](std::string_view text) { warnings.emplace_back(text); });
+  };
+  const PeriodSeries hourly{{0, 3600, 7200, 10800}, {0.0F, 1.5F, std::nanf(""), 3.0F}};
+  ScenarioSeriesFile first = open();
+  first.begin(false);
+  first.add(2, {hourly});
+  first.add(3, {hourly});                                                             // more than are kept
+  folder.write("s.dat", folder.read("s.dat") + "1\tflow\t0001-01-01T01:00:00\t9\n");  // cut off
+  ScenarioSeriesFile second = open();
+  second.begin(true);
+  second.add(2, {hourly});
+  second.add(1, {hourly});
+  const std::vector<ScenarioSeries> read = readScenarioSeries(folder.read("s.dat"));
+  ASSERT_EQ(read.size(), 2U) << folder.read("s.dat");
+  EXPECT_EQ(read[0].number, 2);
+  EXPECT_EQ(read[1].number, 1);
+  EXPECT_EQ(read[1].series.seconds, (std::vector<std::int64_t>{3600, 7200}));
+  EXPECT_EQ(read[1].series.values.front(), 1.5F);
+  EXPECT_TRUE(warnings.empty());
 }
 
 }  // namespace

@@ -8,6 +8,18 @@ import { heading, paragraph, type Section } from './section';
 interface Finding {
   kind: 'good' | 'plain' | 'warning';
   text: string;
+  more?: string[]; // of the same kind, behind a fold
+}
+
+const kFindingsShown = 5;
+
+/** The first few, and the others behind a fold that names them. */
+function folded(all: { name: string; text: string }[], others: string): Finding[] {
+  const found = all.slice(0, kFindingsShown).map(({ text }): Finding => ({ kind: 'plain', text }));
+  const more = all.slice(kFindingsShown);
+  if (more.length === 0) return found;
+  const names = more.slice(0, 10).map(({ name }) => named(name)).join(', ');
+  return [...found, { kind: 'plain', text: `${count(more.length)} more ${others}: ${names}${more.length > 10 ? ', \u2026' : ''}`, more: more.map(({ text }) => text) }];
 }
 
 const kStates = {
@@ -40,16 +52,16 @@ function findings(data: ReportData): Finding[] {
   const found: (Finding | null)[] = [];
   if (run.message) found.push({ kind: run.state === 'finished' ? 'plain' : 'warning', text: run.message });
   found.push(improvement(data));
-  for (const series of data.series.slice(0, 3)) {
+  found.push(...folded(data.series.flatMap((series) => {
     const figures = series.figures?.best;
-    if (!figures) continue;
+    if (!figures) return [];
     const of = series.bestNumber != null && series.bestNumber !== data.best?.number ? `, evaluation ${count(series.bestNumber)}` : '';
     const text = `${named(series.measure)} in the evaluation period${of}: NSE ${number(figures.nse, 3)}, KGE ${number(figures.kge, 3)}, bias ${number(figures.pbias, 3)} %.`;
-    found.push({ kind: 'plain', text });
-  }
-  for (const band of data.band.slice(0, 3)) {
-    found.push({ kind: 'plain', text: `${percent(band.inside)} of the observed values of ${named(band.measure)} lie within the 5 to 95 % band.` });
-  }
+    return [{ name: series.measure, text }];
+  }), 'series'));
+  found.push(...folded(data.band.map((band) => ({
+    name: band.measure, text: `${percent(band.inside)} of the observed values of ${named(band.measure)} lie within the 5 to 95 % band.`,
+  })), 'bands'));
   if (data.sensitivity && data.sensitivity.ranking.length > 0) {
     const first = data.sensitivity.ranking.slice(0, 3).map(named).join(', ');
     found.push({ kind: 'plain', text: `Most sensitive: ${first}.` });
@@ -93,7 +105,9 @@ export function head(data: ReportData): HTMLElement {
       figures ? tile('NSE', number(figures.nse, 3), of) : '',
       figures ? tile('KGE', number(figures.kge, 3), of) : '',
       took ? tile('Took', took) : ''),
-    make('ul', { class: 'findings' }, ...findings(data).map((finding) => make('li', { class: finding.kind }, finding.text))));
+    make('ul', { class: 'findings' }, ...findings(data).map((finding) => make('li', { class: finding.kind }, ...(finding.more
+      ? [make('details', {}, make('summary', {}, finding.text), make('ul', {}, ...finding.more.map((text) => make('li', {}, text))))]
+      : [finding.text])))));
 }
 
 export function runSection(data: ReportData): Section {
@@ -176,14 +190,32 @@ export function resultSection(data: ReportData): Section | null {
   return content.length > 0 ? { id: 'results', title: 'Objectives and measures', content } : null;
 }
 
+/** "2 (dry)" where the evaluation has a name. */
+function nameOfRun(data: ReportData, evaluation: number): string {
+  const name = data.run.runNames?.[evaluation - 1];
+  return name ? `${count(evaluation)} (${shorten(name, 40)})` : count(evaluation);
+}
+
 function rankingTable(data: ReportData): HTMLElement | null {
   const { evaluations } = data;
-  const first = bestShare(evaluations.aggregate, 0).slice(0, 10);
+  const seen = new Set<string>();
+  // A final model run repeats the best set: it is listed once, under the number by which the report knows it.
+  const isRepeated = (place: number) => {
+    const key = JSON.stringify([evaluations.aggregate[place], ...evaluations.parameters.map((column) => column[place])]);
+    return seen.has(key) || !seen.add(key);
+  };
+  const ranked = bestShare(evaluations.aggregate, 1);
+  const known = ranked.findIndex((place) => evaluations.numbers[place] === data.best?.number);
+  if (known > 0 && evaluations.aggregate[ranked[known]!] === evaluations.aggregate[ranked[0]!]) ranked.unshift(...ranked.splice(known, 1));
+  const first: number[] = [];
+  for (const place of ranked) {
+    if (first.length < 10 && !isRepeated(place)) first.push(place);
+  }
   if (first.length < 2 || data.run.task === 'sensitivity') return null;
   const variable = variableParameters(data);
   return table([{ title: 'Evaluation' }, { title: 'Aggregate', number: true },
     ...variable.map((parameter) => ({ title: shorten(parameter.name, 24), hint: parameter.name, number: true }))],
-  first.map((place) => [count(evaluations.numbers[place]!), number(evaluations.aggregate[place], 6),
+  first.map((place) => [nameOfRun(data, evaluations.numbers[place]!), number(evaluations.aggregate[place], 6),
     ...variable.map((_, index) => number(evaluations.parameters[index]?.[place], 5))]), 'Best evaluations');
 }
 

@@ -94,7 +94,7 @@ function dottyPlan(data: ReportData, parameter: Parameter, column: Maybe[], judg
       const best = bestShare(values, 0)[0];
       return {
         grid: { left: 16, right: 14, top: 12, bottom: 16 },
-        xAxis: axis(look, { log, min: parameter.lower ?? undefined, max: parameter.upper ?? undefined, splitNumber: 4 }),
+        xAxis: axis(look, { log, min: parameter.lower ?? undefined, max: parameter.upper ?? undefined, splitNumber: 4, ...(parameter.integer ? { minInterval: 1 } : {}) }),
         yAxis: axis(look, { max: Number.isFinite(top) ? top : undefined, splitNumber: 4 }),
         tooltip: tooltip(look, { formatter: (point: { value: number[] }) => tip(`Evaluation ${count(point.value[2]!)}`,
           [[shorten(parameter.name, 40), number(point.value[0], 6)], [shorten(name, 40), number(point.value[1], 6)]]) }),
@@ -162,7 +162,7 @@ function parallelPlan(data: ReportData, good: number[]): ChartPlan {
     option: (look, is, width) => ({
       parallelAxis: [...variable.map((parameter, dim) => ({
         dim, name: shorten(parameter.name, isClose(width) ? 12 : 18), scale: true, min: is('fit') ? 'dataMin' : parameter.lower, max: is('fit') ? 'dataMax' : parameter.upper,
-        type: parameter.transformation === 'logarithmic' && (parameter.lower ?? 0) > 0 ? 'log' : 'value',
+        type: parameter.transformation === 'logarithmic' && (parameter.lower ?? 0) > 0 ? 'log' : 'value', minInterval: parameter.integer ? 1 : undefined,
       })), { dim: variable.length, name: 'Aggregate', scale: true, type: 'value' }],
       parallel: {
         left: 50, right: 70, top: isClose(width) ? 84 : 48, bottom: 24,
@@ -230,7 +230,7 @@ function spreadPlan(data: ReportData, size: number): ChartPlan {
     option: (look, is) => ({
       legend: legend(look, { data: lineEntries(variable.map(({ name }) => name)), itemWidth: 34 }),
       grid: { left: 24, right: 16, top: 36, bottom: 28 },
-      xAxis: axis(look, { name: 'Evaluation', min: 'dataMin', max: 'dataMax', nameGap: 26 }),
+      xAxis: axis(look, { name: 'Evaluation', min: 'dataMin', max: 'dataMax', minInterval: 1, nameGap: 26 }),
       yAxis: axis(look, { log: is('log'), axisLabel: { formatter: (value: number) => `${number(value, 3)} %` } }),
       tooltip: tooltip(look, { trigger: 'axis', order: 'valueDesc', formatter: (points: { seriesName: string; value: number[] }[]) =>
         tip(`Up to evaluation ${count(points[0]!.value[0]!)}`, points.slice(0, 16).map((point) => [shorten(point.seriesName, 40), `${number(point.value[1], 3)} %`])) }),

@@ -4,7 +4,9 @@ import { timesOf, type Figures, type Maybe, type ReportData, type Series } from 
 import { shorten, table } from '../dom';
 import { count, moment, number } from '../format';
 import type { Look } from '../look';
+import { lineOf, nearest, type Line } from '../lines';
 import { durationCurve, finite, spaced, thin } from '../numbers';
+import { logRange } from '../ticks';
 import { withSeriesAbove } from './above';
 import { grid, heading, type Section } from './section';
 import { viewsOf } from './views';
@@ -17,15 +19,22 @@ interface Simulated {
   values: Maybe[];
 }
 
+// In scenario runs the best is one of those that have names.
+function bestName(data: ReportData, number: number): string {
+  const name = data.run.runNames?.[number - 1];
+  return name ? `best (${shorten(name, 40)}, evaluation ${count(number)})` : `best (evaluation ${count(number)})`;
+}
+
 function simulations(data: ReportData, series: Series): Simulated[] {
   const number = series.bestNumber ?? data.best?.number;
   return [
     { key: 'initial' as const, name: data.initialLabel ?? 'initial parameters', values: series.initial ?? [] },
-    { key: 'best' as const, name: number == null ? 'best' : `best (evaluation ${count(number)})`, values: series.best ?? [] },
+    { key: 'best' as const, name: number == null ? 'best' : bestName(data, number), values: series.best ?? [] },
   ].filter(({ values }) => finite(values).length > 0);
 }
 
-const unitOf = (series: { measure: string; unit?: string | null }) => series.unit || 'Value';
+/** What an axis says of the values: "Discharge [m3/s]". */
+const labelOf = ({ quantity, unit }: Series) => [shorten(quantity ?? '', 60), unit ? `[${shorten(unit, 20)}]` : ''].filter(Boolean).join(' ') || 'Value';
 const onLog = (values: Maybe[], log: boolean) => (log ? values.map((value) => (value !== null && value > 0 ? value : null)) : values);
 const lineStyles = (look: Look) => ({
   initial: { color: look.initial, width: 1.2, type: 'dashed' as const },
@@ -48,6 +57,22 @@ function outsidePeriod(look: Look, times: number[], period: Series['period']): o
   return areas.length === 0 ? {} : { markArea: { silent: true, itemStyle: { color: look.rule, opacity: 0.45 }, data: areas.map(([from, to]) => [{ xAxis: from }, { xAxis: to }]) } };
 }
 
+/** A line and the dots on it; both have one entry in the legend. */
+function drawnLine(name: string, { times, values, dots }: Line, log: boolean, color: string, more: object): object[] {
+  const scaled = onLog(values, log);
+  return [
+    { name, type: 'line', symbol: 'none', sampling: 'lttb', connectNulls: false, color, data: times.map((time, at) => [time, scaled[at]]), ...more },
+    ...(dots.length > 0 ? [{ name, type: 'scatter', symbolSize: 5, itemStyle: { color }, large: dots.length > 3000, ...more,
+      data: dots.filter(([, value]) => !log || value > 0) }] : []),
+  ];
+}
+
+/** Whether zero belongs on the axis: not where it would press the values together, such as water levels. */
+const reachesZero = (columns: Maybe[][]) => {
+  const all = columns.flatMap((values) => { const own = finite(values); return own.length > 0 ? [own.reduce((a, b) => Math.min(a, b)), own.reduce((a, b) => Math.max(a, b))] : []; });
+  return Math.min(...all) < 0.7 * Math.max(...all);
+};
+
 function hydrographPlan(data: ReportData, series: Series): ChartPlan {
   const times = timesOf(series, series.observed.length);
   const simulated = simulations(data, series);
@@ -56,7 +81,13 @@ function hydrographPlan(data: ReportData, series: Series): ChartPlan {
     const observed = series.observed[place] ?? null;
     return value === null || observed === null ? null : value - observed;
   });
-  const step = times.length > 1 ? times[1]! - times[0]! : 86400000;
+  const step = times.slice(1, 1000).reduce((least, time, at) => Math.min(least, time - times[at]!), 86400000);
+  const breaks = series.breaks ?? {};
+  const isPoints = series.observedAsPoints ?? false;
+  const observed = lineOf(times, series.observed, breaks.observed, isPoints, true);
+  const lines = simulated.map((one) => ({ ...one, line: lineOf(times, one.values, breaks[one.key]) }));
+  const apart = residuals ? lineOf(times, residuals, [...breaks.observed ?? [], ...breaks[judged!.key] ?? []].sort((a, b) => a - b), isPoints) : null;
+  const all = [series.observed, ...simulated.map(({ values }) => values)];
   return {
     title: 'Simulated and observed, and the residuals',
     note: `Residual: ${judged ? shorten(judged.name, 60) : 'simulated'} less observed.${outside(times, series.period).length > 0 ? ' Shaded: outside the evaluation period.' : ''} ${series.thinned ? ' Of so many times the extremes of short spans are drawn.' : ''} Drag across the chart to zoom in, move the slider below to go along.`,
@@ -66,30 +97,25 @@ function hydrographPlan(data: ReportData, series: Series): ChartPlan {
     switches: [{ key: 'log', label: 'Log' }],
     option: (look, is) => {
       const style = lineStyles(look);
-      const line = (name: string, column: string, lineStyle: { color: string }, more: object = {}) => ({
-        name, type: 'line', symbol: 'none', sampling: 'lttb', lineStyle, color: lineStyle.color, connectNulls: false,
-        encode: { x: 'time', y: column }, ...more,
-      });
-      const source: Record<string, (Maybe | number)[]> = { time: times, observed: onLog(series.observed, is('log')), residual: residuals ?? [] };
-      for (const { key, values } of simulated) source[key] = onLog(values, is('log'));
+      const ends = { type: 'time', min: times[0], max: times[times.length - 1] };
+      const below = { xAxisIndex: 1, yAxisIndex: 1 };
       return {
-        dataset: { source, dimensions: ['time', ...Object.keys(source).filter((key) => key !== 'time')] },
-        legend: legend(look, { data: lineEntries(['observed', ...simulated.map(({ name }) => name)]), itemWidth: 34 }),
+        legend: legend(look, { itemWidth: 34, data: [...(isPoints ? ['observed'] : lineEntries(['observed'])), ...lineEntries(simulated.map(({ name }) => name))] }),
         axisPointer: { link: [{ xAxisIndex: 'all' }], lineStyle: { color: look.muted } },
         grid: [{ left: 72, right: 16, top: 36, height: 262, outerBoundsMode: 'none' }, { left: 72, right: 16, top: 338, height: 86, outerBoundsMode: 'none' }],
         xAxis: [
-          axis(look, { type: 'time', min: times[0], max: times[times.length - 1], axisLabel: { show: false }, axisTick: { show: false } }),
-          axis(look, { type: 'time', gridIndex: 1, min: times[0], max: times[times.length - 1], axisLine: { onZero: false } }),
+          axis(look, { ...ends, axisLabel: { show: false }, axisTick: { show: false } }),
+          axis(look, { ...ends, gridIndex: 1, axisLine: { onZero: false } }),
         ],
         yAxis: [
-          axis(look, { name: unitOf(series), log: is('log'), nameGap: 48, ...(is('log') ? {} : { scale: false }) }),
+          axis(look, { name: labelOf(series), nameGap: 48, ...(is('log') ? logRange(all) : { scale: !reachesZero(all) }) }),
           axis(look, { name: 'Residual', gridIndex: 1, nameGap: 48, splitNumber: 2, scale: false }),
         ],
         dataZoom: timeZoom(look, [0, 1], 'filter', (time) => moment(time, step)),
         tooltip: tooltip(look, {
           trigger: 'axis',
-          formatter: (points: { seriesName: string; dataIndex: number }[]) => {
-            const place = points[0]!.dataIndex;
+          formatter: (points: { axisValue: number }[]) => {
+            const place = nearest(times, points[0]!.axisValue);
             return tip(moment(times[place]!, step), [
               ['observed', number(series.observed[place])],
               ...simulated.map(({ name, values }): [string, string] => [shorten(name, 40), number(values[place])]),
@@ -98,9 +124,11 @@ function hydrographPlan(data: ReportData, series: Series): ChartPlan {
           },
         }),
         series: [
-          ...simulated.map(({ key, name }) => line(name, key, style[key], { z: key === 'best' ? 3 : 2 })),
-          line('observed', 'observed', style.observed, { z: 4, ...outsidePeriod(look, times, series.period) }),
-          ...(residuals ? [line('residual', 'residual', { color: look.best }, { xAxisIndex: 1, yAxisIndex: 1, lineStyle: { color: look.best, width: 1 }, areaStyle: { color: look.best, opacity: 0.2 } })] : []),
+          ...lines.flatMap(({ key, name, line }) => drawnLine(name, line, is('log'), style[key].color, { lineStyle: style[key], z: key === 'best' ? 3 : 2 })),
+          ...drawnLine('observed', isPoints ? { ...observed, times: [], values: [] } : observed, is('log'), style.observed.color,
+            { lineStyle: style.observed, z: 4, ...outsidePeriod(look, times, series.period) }),
+          ...(apart ? drawnLine('residual', isPoints ? { ...apart, times: [], values: [] } : apart, false, look.best,
+            { ...below, lineStyle: { color: look.best, width: 1 }, areaStyle: { color: look.best, opacity: 0.2 } }) : []),
         ],
       };
     },
@@ -110,6 +138,67 @@ function hydrographPlan(data: ReportData, series: Series): ChartPlan {
       row: (place) => [moment(times[place]!, step), number(series.observed[place]), ...simulated.map(({ values }) => number(values[place])),
         number(residuals?.[place])],
     }),
+  };
+}
+
+/** "dry (evaluation 2)", or the number alone. */
+function scenarioName(data: ReportData, number: number): string {
+  const name = data.run.runNames?.[number - 1];
+  return name ? `${shorten(name, 60)} (${count(number)})` : `scenario ${count(number)}`;
+}
+
+function scenarioPlan(data: ReportData, series: Series): ChartPlan {
+  const times = timesOf(series, series.observed.length);
+  const isPoints = series.observedAsPoints ?? false;
+  const observed = lineOf(times, series.observed, series.breaks?.observed, isPoints, true);
+  const runs = (series.scenarios ?? []).map((one) => {
+    const own = timesOf(one, one.values.length);
+    return { name: scenarioName(data, one.number), times: own, values: one.values, line: lineOf(own, one.values, one.breaks) };
+  });
+  const all = [series.observed, ...runs.map(({ values }) => values)];
+  const step = [times, ...runs.map((run) => run.times)].flatMap((own) => own.slice(1, 1000).map((time, at) => time - own[at]!)).reduce((a, b) => Math.min(a, b), 86400000);
+  return {
+    title: 'The scenarios',
+    note: 'An entry of the legend switches its scenario off and on. Drag across the chart to zoom in, move the slider below to go along.',
+    height: 430,
+    zoom: 'x',
+    switches: [{ key: 'log', label: 'Log' }],
+    option: (look, is) => ({
+      legend: legend(look, { itemWidth: 34, data: [...lineEntries(runs.map(({ name }) => name)), ...(isPoints ? ['observed'] : lineEntries(['observed']))] }),
+      grid: { left: 64, right: 16, top: 36, height: 318, outerBoundsMode: 'none' },
+      xAxis: axis(look, { type: 'time' }),
+      yAxis: axis(look, { name: labelOf(series), nameGap: 48, ...(is('log') ? logRange(all) : { scale: !reachesZero(all) }) }),
+      dataZoom: timeZoom(look, [0], 'filter', (time) => moment(time, step)),
+      tooltip: tooltip(look, {
+        trigger: 'axis',
+        formatter: (points: { axisValue: number }[]) => {
+          const time = points[0]!.axisValue;
+          const at = (own: number[], values: Maybe[]) => {
+            const place = nearest(own, time);
+            return own[place] !== undefined && Math.abs(own[place]! - time) < step / 2 ? values[place] : null;
+          };
+          return tip(moment(time, step), [
+            ...runs.map((run): [string, string] => [run.name, number(at(run.times, run.values))]),
+            ['observed', number(at(times, series.observed))],
+          ]);
+        },
+      }),
+      series: [
+        ...runs.flatMap(({ name, line }, index) => drawnLine(name, line, is('log'), look.many[index % look.many.length]!, {
+          lineStyle: { color: look.many[index % look.many.length], width: 1.6, type: (['solid', 'dashed', 'dotted'] as const)[Math.floor(index / look.many.length) % 3] },
+        })),
+        ...drawnLine('observed', isPoints ? { ...observed, times: [], values: [] } : observed, is('log'), look.observed,
+          { lineStyle: { color: look.observed, width: 1 }, z: 4 }),
+      ],
+    }),
+    values: () => {
+      const longest = runs.reduce((most, run) => (run.times.length > most.length ? run.times : most), [] as number[]);
+      return {
+        columns: [{ title: 'Time' }, ...runs.map(({ name }) => ({ title: name, number: true }))],
+        length: longest.length,
+        row: (place) => [moment(longest[place]!, step), ...runs.map((run) => number(run.values[nearest(run.times, longest[place]!)]))],
+      };
+    },
   };
 }
 
@@ -191,7 +280,7 @@ function durationPlan(data: ReportData, series: Series): ChartPlan {
       legend: legend(look, { data: lineEntries(curves.map(({ name }) => name)), itemWidth: 34 }),
       grid: { left: 26, right: 16, top: 36, bottom: 28 },
       xAxis: axis(look, { name: 'Time exceeded (%)', min: 0, max: 100, nameGap: 26 }),
-      yAxis: axis(look, { name: unitOf(series), log: is('log'), nameGap: 44 }),
+      yAxis: axis(look, { name: labelOf(series), nameGap: 44, ...(is('log') ? logRange(curves.map(({ points }) => points.map(([, value]) => value))) : {}) }),
       tooltip: tooltip(look, { trigger: 'axis', formatter: (points: { seriesName: string; value: number[] }[]) =>
         tip(`Exceeded ${number(points[0]!.value[0], 3)} % of the time`, points.map((point) => [shorten(point.seriesName, 40), number(point.value[1])])) }),
       series: curves.map(({ key, name, points }) => ({
@@ -238,6 +327,7 @@ export function seriesSection(data: ReportData): Section | null {
     content: shown.flatMap((series) => [
       heading(series.measure),
       figuresTable(data, series),
+      (series.scenarios?.length ?? 0) > 1 ? chart(scenarioPlan(data, series)) : null,
       chart(withSeriesAbove(hydrographPlan(data, series), series)),
       ...(judgedPlaces(series).length > 0 && simulations(data, series).length > 0
         ? [grid(chart(scatterPlan(data, series)), chart(durationPlan(data, series)))] : []),

@@ -1,0 +1,41 @@
+#include "report/series_labels.h"
+
+#include <map>
+#include <memory>
+#include <optional>
+
+#include "measures/period_series.h"
+#include "platform/series/time_series_object.h"
+
+namespace mirevo {
+
+std::vector<SeriesLabel> seriesLabels(std::span<const OutputMeasure> measures, std::span<const std::size_t> shown) {
+  std::vector<SeriesLabel> labels(shown.size());
+  std::map<std::string, std::vector<std::size_t>> unsaid;  // places in the list, by the file that may say it
+  for (std::size_t place = 0; place < shown.size(); ++place) {
+    for (const OutputMeasure& other : measures) {
+      const bool isOfPair =
+          other.interfaceType == InterfaceType::timeSeries && isSamePair(other, measures[shown[place]]);
+      if (isOfPair && labels[place].quantity.empty()) labels[place].quantity = other.displayName;
+      if (isOfPair && labels[place].unit.empty()) labels[place].unit = other.unit;
+    }
+    if (labels[place].quantity.empty() || labels[place].unit.empty()) {
+      unsaid[measures[shown[place]].observation.fileName].push_back(place);
+    }
+  }
+  for (const auto& [fileName, places] : unsaid) {
+    std::string reason;
+    const auto file = createTimeSeriesObject(fileName, reason);
+    if (!file || !file->open(fileName)) continue;
+    for (const std::size_t place : places) {
+      const int item = measures[shown[place]].observation.itemNo;
+      const std::string unit = file->itemUnit(item);
+      const auto [name, unitInName] = splitUnit(file->itemName(item));
+      if (labels[place].quantity.empty()) labels[place].quantity = unit == unitInName ? name : file->itemName(item);
+      if (labels[place].unit.empty()) labels[place].unit = unit;
+    }
+  }
+  return labels;
+}
+
+}  // namespace mirevo
