@@ -331,7 +331,7 @@ export function seriesSection(data: ReportData): Section | null {
       chart(withSeriesAbove(hydrographPlan(data, series), series)),
       ...(judgedPlaces(series).length > 0 && simulations(data, series).length > 0
         ? [grid(chart(scatterPlan(data, series)), chart(durationPlan(data, series)))] : []),
-      ...viewsOf(series),
+      ...viewsOf(series, unitOf(series)),
     ]),
   };
 }

@@ -12,7 +12,8 @@ function folded(title: string, content: () => Node[]): HTMLElement {
   return details;
 }
 
-export function viewsOf({ measure, views, unit }: Series): Node[] {
+/** `label`: what an axis says of the values. */
+export function viewsOf({ measure, views }: Series, label: string): Node[] {
   if (!views) return [];
   const { peaks } = views;
   return [
@@ -20,7 +21,7 @@ export function viewsOf({ measure, views, unit }: Series): Node[] {
       fitsTable(views, measure),
       make('p', { class: 'note' }, 'Over all times of the hydrograph. Efficiencies need 10 values.'),
     ]),
-    folded('Low flows and floods', () => extremesView(views, unit || 'Value')),
+    folded('Low flows and floods', () => extremesView(views, label)),
     ...(peaks && peaks.length > 0 ? [folded('Largest peaks', () => [peaksTable(views, peaks, measure)])] : []),
     folded('Residuals', () => residualsView(views)),
   ];
