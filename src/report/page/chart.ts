@@ -36,8 +36,9 @@ export interface ChartPlan {
   small?: boolean; // several side by side
   zoom?: 'x' | 'xy';
   switches?: Switch[];
-  /** What to draw. `is(key)`: whether that switch is on. A plan that takes the width is asked again when it changes. */
-  option: (look: Look, is: (key: string) => boolean, width: number) => Option;
+  /** What to draw. `is(key)`: whether that switch is on. */
+  option: (look: Look, is: (key: string) => boolean, width?: number) => Option;
+  fitsWidth?: boolean; // `option` is asked again when the width changes
   values?: () => Values;
   csv?: () => Values; // where it is not `values`; a chart without both draws points, and has their coordinates
   thinned?: boolean; // its file says so
@@ -50,7 +51,7 @@ export type Chart = HTMLElement & { redraw: () => void };
 const kRowsShown = 200;
 const kPaperWidth = 680; // CSS pixels: A4 without its margins
 const kDrawnUnasked = 80; // of a report with more charts, only those in view are drawn
-const kFileWidth = 960; // of a drawing as a file, whatever the width of the window
+export const kFileWidth = 960; // of a drawing as a file, whatever the width of the window
 const kSmallFileWidth = 480;
 const kPrintedPixels = 60e6; // of all charts together: a browser keeps them in memory until the print is done
 const drawers = new Map<Element, Drawn>();
@@ -135,7 +136,7 @@ class Drawn {
   private fit(): void {
     if (this.picture || !this.chart || this.chart.getWidth() === this.canvas.clientWidth) return;
     if (!this.isInView) this.isStale = true;
-    else if (this.plan.option.length > 2) this.refresh();
+    else if (this.plan.fitsWidth) this.refresh();
     else {
       this.chart.resize({ width: this.canvas.clientWidth });
       this.chart.getZr().flush();

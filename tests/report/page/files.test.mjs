@@ -11,7 +11,7 @@ after(() => browser.close());
 
 /** The file that the browser saves when Enter is pressed on a button. */
 async function saved(page, button) {
-  const [file] = await Promise.all([page.waitForEvent('download'), button.focus().then(() => page.keyboard.press('Enter'))]);
+  const [file] = await Promise.all([page.waitForEvent('download'), button.press('Enter')]);
   return { name: file.suggestedFilename(), text: readFileSync(await file.path(), 'utf8') };
 }
 
@@ -20,10 +20,7 @@ const keepFiles = (page) => page.evaluate(() => {
   URL.createObjectURL = (blob) => { window.kept = { blob }; return '#'; };
   HTMLAnchorElement.prototype.click = function click() { window.kept.name = this.download; };
 });
-const kept = (page, button) => button.evaluate(async (element) => {
-  element.click();
-  return { name: window.kept.name, text: await window.kept.blob.text() };
-});
+const kept = (button) => button.evaluate((element) => { element.click(); return window.kept.blob.text().then((text) => ({ name: window.kept.name, text })); });
 
 /** Cells of a file whose lines end with CR and LF, quotes as in RFC 4180. */
 const cellsOf = (text) => text.trimEnd().split('\r\n').map((line) => line.match(/("([^"]|"")*"|[^,"]*)(,|$)/g).slice(0, line.endsWith(',') ? undefined : -1));
@@ -34,22 +31,19 @@ for (const name of ['optimisation', 'uncertainty', 'sensitivity']) {
     const names = new Set();
     await keepFiles(page);
     for (const figure of await page.$$('figure')) {
-      const [svg, csv] = [await kept(page, await figure.$('.take >> nth=0')), await kept(page, await figure.$('.take >> nth=1'))];
-      for (const [file, ending] of [[svg, 'svg'], [csv, 'csv']]) {
-        assert.match(file.name, new RegExp(`^basin_[a-z-]+_.+\\.${ending}$`));
-        names.add(file.name);
-      }
+      const [svg, csv] = [await kept(await figure.$('.take >> nth=0')), await kept(await figure.$('.take >> nth=1'))];
+      assert.match(`${svg.name} ${csv.name}`, /^basin_[a-z-]+_[^ ]+\.svg basin_[a-z-]+_[^ ]+\.csv$/);
+      names.add(svg.name);
       const drawn = await page.evaluate((text) => {
         const root = new DOMParser().parseFromString(text, 'image/svg+xml').documentElement;
         return [root.tagName, root.querySelector('rect').getAttribute('fill'), root.querySelectorAll('path, polyline, rect').length, root.querySelectorAll('script, img, [onload]').length];
       }, svg.text);
-      assert.deepEqual([drawn[0], drawn[1], drawn[3]], ['svg', '#ffffff', 0], svg.name);
-      assert.ok(drawn[2] > 4, svg.name);
+      assert.deepEqual([drawn[0], drawn[1], drawn[2] > 4, drawn[3]], ['svg', '#ffffff', true, 0], svg.name);
       const [head, ...rows] = cellsOf(csv.text);
       assert.ok(rows.length > 0 && head.length > 1, csv.name);
       for (const row of rows) assert.equal(row.length, head.length, `${csv.name}: ${row}`);
     }
-    assert.ok(names.size > 10);
+    assert.ok(names.size > 5);
     assert.deepEqual(complaints, []);
     await page.context().close();
   });
@@ -65,12 +59,10 @@ test('a table is saved by keyboard, with every value in full, times as ISO, and 
   assert.match(name, /^basin_series_.*_thinned\.csv$/);
   const rows = cellsOf(text);
   assert.deepEqual([rows[0][0], rows[0][1]], ['Time,', 'observed (m\u00b3/s),']);
-  assert.equal(rows.length, 1 + data.series[0].observed.length);
   assert.match(rows[1][0], /^\d{4}-\d\d-\d\dT\d\d:\d\d:\d\d,$/);
-  assert.equal(rows[2][1], '1234567.125,');
-  assert.equal(rows[3][3], '-0.00001234,');
+  assert.deepEqual([rows.length, rows[2][1], rows[3][3]], [1 + data.series[0].observed.length, '1234567.125,', '-0.00001234,']);
   await keepFiles(page);
-  const sets = cellsOf((await kept(page, await page.$('#good-sets .take >> nth=1'))).text);
+  const sets = cellsOf((await kept(await page.$('#good-sets .take >> nth=1'))).text);
   assert.deepEqual([sets[0].join(''), Number(sets[1].at(-1)).toPrecision(6)], ['Evaluation,a,b,Aggregate', data.best.aggregate.toPrecision(6)], 'the best set comes first');
   await page.context().close();
 });

@@ -1,4 +1,4 @@
-import { axis, tip, tooltip, type ChartPlan } from '../chart';
+import { axis, kFileWidth, tip, tooltip, type ChartPlan } from '../chart';
 import type { Maybe } from '../data';
 import { shorten } from '../dom';
 import { kMissing, number } from '../format';
@@ -17,7 +17,8 @@ export function heatmap(title: string, rows: string[], columns: string[], matrix
     title,
     note,
     height: Math.min(900, 110 + Math.max(28, Math.min(40, 420 / rows.length)) * rows.length),
-    option: (look, _, width) => {
+    fitsWidth: true,
+    option: (look, _, width = kFileWidth) => {
       const cell = (width - kBeside) / columns.length;
       const few = labelled && cell >= 16;
       return {

@@ -1,5 +1,5 @@
 // The course of the search, and what the evaluations tell of each parameter.
-import { axis, chart, legend, lineEntries, tip, tooltip, type Chart, type ChartPlan } from '../chart';
+import { axis, chart, kFileWidth, legend, lineEntries, tip, tooltip, type Chart, type ChartPlan } from '../chart';
 import { variableParameters, type Maybe, type Parameter, type ReportData } from '../data';
 import { choice, shorten } from '../dom';
 import { count, number, tick } from '../format';
@@ -159,7 +159,8 @@ function parallelPlan(data: ReportData, good: number[]): ChartPlan {
       good.length > drawn.length ? ` ${count(drawn.length)} of ${count(good.length)} lines are drawn.` : ''}`,
     height: 400,
     switches: [{ key: 'fit', label: 'Fit axes', hint: 'Axes over the values of these sets instead of the bounds' }],
-    option: (look, is, width) => ({
+    fitsWidth: true,
+    option: (look, is, width = kFileWidth) => ({
       parallelAxis: [...variable.map((parameter, dim) => ({
         dim, name: shorten(parameter.name, isClose(width) ? 12 : 18), scale: true, min: is('fit') ? 'dataMin' : parameter.lower, max: is('fit') ? 'dataMax' : parameter.upper,
         type: parameter.transformation === 'logarithmic' && (parameter.lower ?? 0) > 0 ? 'log' : 'value', minInterval: parameter.integer ? 1 : undefined,
