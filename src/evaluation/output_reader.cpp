@@ -59,7 +59,9 @@ OutputReader::OutputReader(const ModelDescription& description, const ObjectiveA
       aggregator_(aggregator),
       sources_(measureSources(description.measures, description.measureFile, description.baseFolder)),
       series_(SeriesTables::MirevoTSobjectInit(description.measures, description.period, description.isForRuns)),
-      shownMeasures_(measuresOfDistinctPairs(description.measures)) {
+      shownMeasures_(measuresOfDistinctPairs(description.measures)),
+      shownPeriod_(hullOf(description.period, description.validationPeriods)),
+      warnings_(series_.warnings()) {
   for (const OutputMeasure& measure : description.measures) {
     if (measure.interfaceType != InterfaceType::measureFile) continue;
     numbersNeeded_ = std::max(numbersNeeded_, static_cast<std::size_t>(measure.measurementNo));
@@ -73,6 +75,22 @@ OutputReader::OutputReader(const ModelDescription& description, const ObjectiveA
     if (measure.interfaceType != InterfaceType::timeSeries) continue;
     observedSeries_.push_back(
         readObservedSeries(i, measure, description.period, description.keptPrecision, series_.observation(i)));
+  }
+  prepareValidation();
+}
+
+void OutputReader::prepareValidation() {
+  for (const auto& [i, k] : validationTargets(description_.measures, description_.validationPeriods)) {
+    const ValidationPeriod& period = description_.validationPeriods[k];
+    const Validated& made =
+        validated_.emplace_back(Validated{i, description_.measures[i], judgedAs(period, description_.period)});
+    if (!description_.isForRuns) continue;
+    const ObservedSeries observed =
+        readObservedSeries(i, made.measure, made.period, SeriesPrecision::single, series_.observation(i));
+    if (!observed.values.empty()) continue;
+    warnings_.push_back(
+        fmt::format("output measure {} has no observation in the validation period {}, and so no value there",
+                    quotedForMessage(made.measure.name), quotedForMessage(period.name)));
   }
 }
 
@@ -105,7 +123,7 @@ std::vector<PeriodSeries> OutputReader::readShownObservations() {
   std::vector<PeriodSeries> observations;
   for (const std::size_t i : shownMeasures_) {
     observations.push_back(
-        readPeriodSeries(series_.observation(i), description_.measures[i].observation, description_.period));
+        readPeriodSeries(series_.observation(i), description_.measures[i].observation, shownPeriod_));
   }
   return observations;
 }
@@ -142,13 +160,17 @@ EvaluationResult OutputReader::read(const OutputFiles& files) {
                                               trimTrailing(description_.objectives[i].name), formatReal(*objective))));
   }
   result.aggregate = aggregator_.aggregate(result.objectiveValues);
+  for (const Validated& one : validated_) {
+    result.validationValues.push_back(
+        validationValue(one.measure, one.period, series_.simulation(one.index), series_.observation(one.index)));
+  }
   return result;
 }
 
 std::vector<PeriodSeries> OutputReader::readShownSeries() {
   std::vector<PeriodSeries> shown;
   for (const std::size_t i : shownMeasures_) {
-    shown.push_back(readPeriodSeries(series_.simulation(i), description_.measures[i].simulation, description_.period));
+    shown.push_back(readPeriodSeries(series_.simulation(i), description_.measures[i].simulation, shownPeriod_));
   }
   return shown;
 }
@@ -157,6 +179,7 @@ EvaluationResult OutputReader::failedResult(EvaluationFailure failure) const {
   EvaluationResult result;
   result.measureValues.assign(description_.measures.size(), kFailedRunValue);
   result.objectiveValues.assign(description_.objectives.size(), kFailedRunValue);
+  result.validationValues.assign(validated_.size(), std::nan(""));
   result.failure = std::move(failure);
   return result;
 }

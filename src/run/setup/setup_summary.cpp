@@ -50,6 +50,9 @@ class Summary final {
 
   void addMeasures() {
     line("Evaluation period: {} to {}", formatDate(config_.period.start), formatDate(config_.period.end));
+    for (const ValidationPeriod& period : config_.validationPeriods) {
+      line("Validation period {}: {} to {}", period.name, formatDate(period.start), formatDate(period.end));
+    }
     line("Output measures: {}", config_.measures.size());
     for (const OutputMeasure& measure : config_.measures) {
       line("  {}: {}, {}, objective function {}", measure.name, statisticWithBest(measure), weightText(measure),

@@ -24,6 +24,9 @@ std::optional<SettingRefusal> validateParameterDefinition(const ModelParameter& 
 std::optional<SettingRefusal> validateEquations(const InternalConstraint& constraint);
 
 std::optional<SettingRefusal> validateEvaluationPeriod(const EvaluationPeriod& period);
+std::optional<SettingRefusal> validateValidationPeriod(const ValidationPeriod& period);
+/// Checks that no earlier validation period has the name.
+std::optional<SettingRefusal> validatePeriodName(const ValidationPeriod& period, NamesUsed& names);
 /// Checks the number of the value in the output-measure file, for a measure of interface type 1.
 std::optional<SettingRefusal> validateMeasurementNumber(const OutputMeasure& measure);
 /// That the statistic leaves the choice of a transformation to the setup.
