@@ -10,6 +10,7 @@
 #include "report/failure_reasons.h"
 #include "run/results/run_record.h"
 #include "run/results/series_table.h"
+#include "run/results/validation_table.h"
 
 namespace mirevo {
 
@@ -121,6 +122,16 @@ struct ReportedSensitivity {
   std::optional<ReportedCovariance> covariance;
 };
 
+/// The evaluation period or a validation period.
+struct ReportedPeriod {
+  std::string name;
+  std::string start;
+  std::string end;
+  std::int64_t first = 0;  ///< secondNumber() of its ends
+  std::int64_t last = 0;
+  bool isValidation = false;
+};
+
 struct ReportData {
   std::string program;
   ReportedRun run;
@@ -135,6 +146,9 @@ struct ReportData {
   std::int64_t periodFirst = 0;  ///< secondNumber() of the ends of the evaluation period
   std::int64_t periodLast = 0;
   SeriesTable series;
+  std::vector<ReportedPeriod> periods;  ///< the evaluation period, and those of validation; empty without any of these
+  ValidationTable validation;
+  std::vector<ShownSeries> wholeSeries;  ///< `series` from the first to the last period; empty without `periods`
   std::vector<ReportedBand> bands;
   std::optional<ReportedSensitivity> sensitivity;
   std::vector<std::string> summary;  ///< the closing lines of the result file

@@ -8,6 +8,7 @@
 #include "common/calendar.h"
 #include "measures/fit_figures.h"
 #include "report/json_writer.h"
+#include "report/report_validation.h"
 #include "report/thinning.h"
 
 namespace mirevo {
@@ -146,12 +147,54 @@ void writeFlowDuration(JsonWriter& json, const ShownSeries& series) {
   json.key("best").numbers(flowDuration(series.best), Digits::drawn).endObject();
 }
 
+void writePeriod(JsonWriter& json, const ReportedPeriod& period) {
+  json.member("name", period.name).member("start", period.start).member("end", period.end);
+  json.member("kind", period.isValidation ? "validation" : "calibration");
+}
+
+/// The periods with the figures of the best evaluation in each; `whole` reaches over all of them.
+void writePeriodsOf(JsonWriter& json, const ReportData& data, const ShownSeries& whole) {
+  json.key("periods").beginArray();
+  for (const ReportedPeriod& period : data.periods) {
+    writePeriod(json.beginObject(), period);
+    json.key("first").integer(epochMilliseconds(period.first)).key("last").integer(epochMilliseconds(period.last));
+    const ShownSeries part = partOf(whole, period.first, period.last);
+    if (data.series.best) writeFigures(json, "best", fitFigures(part.best, part.observed));
+    json.endObject();
+  }
+  json.endArray();
+}
+
+void writeValidation(JsonWriter& json, const ReportData& data) {
+  const ValidationTable& table = data.validation;
+  if (table.measures.empty()) return;
+  json.key("validation").beginObject().member("best", table.bestNumber).member("tenth", table.tenth);
+  json.member("count", table.count).key("periods").beginArray();
+  for (const ReportedPeriod& period : data.periods) {
+    writePeriod(json.beginObject(), period);
+    json.endObject();
+  }
+  json.endArray().key("measures").beginArray();
+  for (std::size_t i = 0; i < table.measures.size(); ++i) {
+    json.beginObject().member("name", table.names[i]);
+    json.member("statistic", data.measures[table.measures[i]].statistic).key("values").beginArray();
+    for (const ValidationRange& range : table.values[i]) {
+      json.beginObject().member("best", range.best).member("least", range.least);
+      json.member("median", range.median).member("largest", range.largest).endObject();
+    }
+    json.endArray().endObject();
+  }
+  json.endArray().endObject();
+}
+
 void writeSeries(JsonWriter& json, const ReportData& data) {
   json.key("series").beginArray();
-  for (const ShownSeries& series : data.series.series) {
+  for (std::size_t i = 0; i < data.series.series.size(); ++i) {
+    const ShownSeries& series = data.series.series[i];
+    const ShownSeries& whole = i < data.wholeSeries.size() ? data.wholeSeries[i] : series;
     json.beginObject().member("measure", series.measure).key("unit").null();
-    const bool isThinned = series.seconds.size() > kMostDrawnTimes;
-    const ShownSeries& drawn = isThinned ? thinned(series) : series;
+    const bool isThinned = whole.seconds.size() > kMostDrawnTimes;
+    const ShownSeries& drawn = isThinned ? thinned(whole) : whole;
     writeTimes(json, drawn.seconds);
     json.key("observed").numbers(drawn.observed, Digits::drawn);
     if (data.series.initial) json.key("initial").numbers(drawn.initial, Digits::drawn);
@@ -160,6 +203,7 @@ void writeSeries(JsonWriter& json, const ReportData& data) {
     }
     json.key("period").beginArray().integer(epochMilliseconds(data.periodFirst));
     json.integer(epochMilliseconds(data.periodLast)).endArray();
+    if (!data.periods.empty()) writePeriodsOf(json, data, whole);
     json.key("figures").beginObject();
     if (data.series.initial) writeFigures(json, "initial", fitFigures(series.initial, series.observed));
     if (data.series.best) writeFigures(json, "best", fitFigures(series.best, series.observed));
@@ -237,6 +281,7 @@ std::string reportJson(const ReportData& data) {
   writeFailures(json, data);
   writeEvaluations(json, data.evaluations);
   writeSeries(json, data);
+  writeValidation(json, data);
   writeBands(json, data);
   if (data.sensitivity) writeSensitivity(json, *data.sensitivity);
   json.member("summary", data.summary).endObject();

@@ -73,6 +73,12 @@ TEST_F(ValidationPeriods, AreComputedLikeAnEvaluationPeriodAndChangeNothingElse)
   EXPECT_THAT(whole, HasSubstr("\n#      median of the best tenth "));
   EXPECT_NE(folder_.read("basin_Series.dat").find("\nflow\t2001-12-31T00:00:00\t"), std::string::npos);
 
+  const std::string report = folder_.read("basin_Report.html");
+  for (const char* part : {R"("kind":"validation","first":993945600000,"last":1009756800000,"best":{"n":184,)",
+                           R"("figures":{"initial":{"n":181,)", R"("validation":{"best":)"}) {
+    EXPECT_NE(report.find(part), std::string::npos) << part;
+  }
+
   folder_.editSetup("Restart = 0", "Restart = 1");
   folder_.write(resultFile_, whole.substr(0, whole.find("\n20\t") + 1));
   run();

@@ -7,7 +7,7 @@ import {
 } from 'echarts/components';
 import { init, use, type ECharts, type EChartsCoreOption } from 'echarts/core';
 import { CanvasRenderer } from 'echarts/renderers';
-import { make, table, type Column } from './dom';
+import { make, shorten, table, type Column } from './dom';
 import { count, number } from './format';
 import { look, onLookChange, setPrinting, type Look } from './look';
 import { spaced } from './numbers';
@@ -39,6 +39,7 @@ export interface ChartPlan {
   height: number;
   small?: boolean; // several side by side
   zoom?: 'x' | 'xy';
+  spans?: { label: string; first: number; last: number }[]; // of the x axis, each with a button that zooms to it
   switches?: Switch[];
   /** What to draw. `is(key)`: whether that switch is on. */
   option: (look: Look, is: (key: string) => boolean) => Option;
@@ -94,6 +95,11 @@ class Drawn {
     }
     this.chart.getZr().flush();
     this.figure.dataset.drawn = 'true';
+  }
+
+  zoomTo(first: number, last: number): void {
+    this.draw();
+    this.chart!.dispatchAction({ type: 'dataZoom', dataZoomIndex: 0, startValue: first, endValue: last });
   }
 
   resetZoom(): void {
@@ -250,6 +256,9 @@ export function chart(plan: ChartPlan): Chart {
       },
     }, item.label);
     tools.append(button);
+  }
+  for (const { label, first, last } of plan.spans ?? []) {
+    tools.append(make('button', { type: 'button', title: `Zoom to ${label}`, onclick: () => drawn.zoomTo(first, last) }, shorten(label, 24)));
   }
   if (plan.zoom) {
     tools.append(make('button', {

@@ -101,6 +101,23 @@ export interface FlowDuration {
   best?: Maybe[];
 }
 
+/** The evaluation period or a validation period. */
+export interface Period {
+  name: string;
+  start: string; // as in the log
+  end: string;
+  kind: 'calibration' | 'validation';
+}
+
+/** Calibration and validation side by side; `values` has one entry per period. */
+export interface Validation {
+  best: number; // evaluation
+  tenth: number; // evaluations in the best tenth; 0: none is told apart
+  count: number; // of which it is the tenth
+  periods: Period[];
+  measures: { name: string; statistic: string; values: { best: Maybe; least: Maybe; median: Maybe; largest: Maybe }[] }[];
+}
+
 /** A simulated and an observed series. */
 export interface Series extends Times {
   measure: string; // names of all measures that compare the two
@@ -110,6 +127,7 @@ export interface Series extends Times {
   best?: Maybe[];
   bestNumber?: number | null;
   period?: [number, number] | null;
+  periods?: (Period & { first: number; last: number; best?: Figures | null })[]; // in a run with validation periods
   thinned?: boolean; // reduced to the extremes of short spans; figures and `flowDuration` are computed from all values
   flowDuration?: FlowDuration;
   figures?: { initial?: Figures | null; best?: Figures | null };
@@ -162,6 +180,7 @@ export interface ReportData {
   failures: Failure[];
   evaluations: Evaluations;
   series: Series[];
+  validation?: Validation | null;
   band: Band[];
   sensitivity: Sensitivity | null;
   summary: string[];

@@ -6,6 +6,7 @@ import { count, moment, number } from '../format';
 import type { Look } from '../look';
 import { durationCurve, finite, spaced, thin } from '../numbers';
 import { grid, heading, type Section } from './section';
+import { kShadedNote, shadedPeriods, spansOf } from './validation';
 
 const kCurvePoints = 700;
 
@@ -57,9 +58,10 @@ function hydrographPlan(data: ReportData, series: Series): ChartPlan {
   const step = times.length > 1 ? times[1]! - times[0]! : 86400000;
   return {
     title: 'Simulated and observed, and the residuals',
-    note: `Residual: ${judged ? shorten(judged.name, 60) : 'simulated'} less observed.${outside(times, series.period).length > 0 ? ' Shaded: outside the evaluation period.' : ''} ${series.thinned ? ' Of so many times the extremes of short spans are drawn.' : ''} Drag across the chart to zoom in, move the slider below to go along.`,
+    note: `Residual: ${judged ? shorten(judged.name, 60) : 'simulated'} less observed.${series.periods ? kShadedNote : outside(times, series.period).length > 0 ? ' Shaded: outside the evaluation period.' : ''} ${series.thinned ? ' Of so many times the extremes of short spans are drawn.' : ''} Drag across the chart to zoom in, move the slider below to go along.`,
     height: 492,
     zoom: 'x',
+    spans: spansOf(series),
     switches: [{ key: 'log', label: 'Log' }],
     option: (look, is) => {
       const style = lineStyles(look);
@@ -96,7 +98,7 @@ function hydrographPlan(data: ReportData, series: Series): ChartPlan {
         }),
         series: [
           ...simulated.map(({ key, name }) => line(name, key, style[key], { z: key === 'best' ? 3 : 2 })),
-          line('observed', 'observed', style.observed, { z: 4, ...outsidePeriod(look, times, series.period) }),
+          line('observed', 'observed', style.observed, { z: 4, ...(series.periods ? shadedPeriods(look, series) : outsidePeriod(look, times, series.period)) }),
           ...(residuals ? [line('residual', 'residual', { color: look.best }, { xAxisIndex: 1, yAxisIndex: 1, lineStyle: { color: look.best, width: 1 }, areaStyle: { color: look.best, opacity: 0.2 } })] : []),
         ],
       };
