@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <array>
+#include <limits>
 #include <utility>
 
 namespace mirevo {
@@ -51,6 +52,7 @@ void EvaluationResult::fail(EvaluationFailure why) {
   measureValues.assign(measureValues.size(), kFailedRunValue);
   objectiveValues.assign(objectiveValues.size(), kFailedRunValue);
   aggregate = kFailedRunValue;
+  validationValues.assign(validationValues.size(), std::numeric_limits<double>::quiet_NaN());
   exactMeasures.clear();
   simulatedValues.clear();
   shownSeries.clear();

@@ -92,6 +92,9 @@ struct EvaluationResult {
   std::vector<double> measureValues;    ///< one per output measure
   std::vector<double> objectiveValues;  ///< one per objective function
   double aggregate = kFailedRunValue;   ///< what the searches minimise
+  /// One per entry of validationTargets(), NaN where there is none, as for a failed evaluation. Nothing depends on
+  /// them.
+  std::vector<double> validationValues;
   /// If the task asks for them, the output measures in 64 bits, from all digits of the series; a number that the model
   /// wrote is the one of `measureValues`. Empty for a failed evaluation.
   std::vector<double> exactMeasures;

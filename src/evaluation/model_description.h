@@ -7,6 +7,7 @@
 #include "measures/kept_steps.h"
 #include "measures/objective_functions.h"
 #include "measures/output_measure.h"
+#include "measures/validation_period.h"
 #include "parameters/template_file.h"
 
 namespace mirevo {
@@ -19,6 +20,7 @@ struct ModelDescription {
   std::vector<OutputMeasure> measures;
   std::string measureFile;  ///< output-measure file; empty when no measure is of interface type 1
   EvaluationPeriod period;
+  std::vector<ValidationPeriod> validationPeriods;
   double minimumCoverage = 0.0;  ///< share of the first successful run's pairs below which a run fails
   std::vector<ObjectiveFunction> objectives;
   std::vector<std::string> savedFiles;  ///< files kept from every model run

@@ -59,7 +59,9 @@ OutputReader::OutputReader(const ModelDescription& description, const ObjectiveA
       aggregator_(aggregator),
       sources_(measureSources(description.measures, description.measureFile, description.baseFolder)),
       series_(SeriesTables::MirevoTSobjectInit(description.measures, description.period, description.isForRuns)),
-      shownMeasures_(measuresOfDistinctPairs(description.measures)) {
+      shownMeasures_(measuresOfDistinctPairs(description.measures)),
+      shownPeriod_(hullOf(description.period, description.validationPeriods)),
+      warnings_(series_.warnings()) {
   for (std::size_t i = 0; i < sources_.size(); ++i) {
     const ComparedItems& items = series_.comparedItems(i);
     if (!items.simulated.empty()) sources_[i].simulated += ", " + items.simulated;
@@ -81,6 +83,24 @@ OutputReader::OutputReader(const ModelDescription& description, const ObjectiveA
   }
   if (description.keptSteps) {
     addSimulatedSteps(*description.keptSteps, description.measures, description.period, observedSeries_);
+  }
+  prepareValidation();
+}
+
+void OutputReader::prepareValidation() {
+  for (const auto& [i, k] : validationTargets(description_.measures, description_.validationPeriods)) {
+    const ValidationPeriod& period = description_.validationPeriods[k];
+    Validated& made =
+        validated_.emplace_back(Validated{i, description_.measures[i], judgedAs(period, description_.period)});
+    made.measure.selection.start.reset();  // its own period is one of calibration
+    made.measure.selection.end.reset();
+    if (!description_.isForRuns) continue;
+    const ObservedSeries observed =
+        readObservedSeries(i, made.measure, made.period, SeriesPrecision::single, series_.observation(i));
+    if (!observed.values.empty()) continue;
+    warnings_.push_back(
+        fmt::format("output measure {} has no observation in the validation period {}, and so no value there",
+                    quotedForMessage(made.measure.name), quotedForMessage(period.name)));
   }
 }
 
@@ -113,11 +133,15 @@ std::optional<std::int64_t> OutputReader::observationLeftOut(std::size_t measure
 }
 
 std::vector<PeriodSeries> OutputReader::readShownObservations() {
+  std::vector<EvaluationPeriod> judgedPeriods;
+  for (const ValidationPeriod& period : description_.validationPeriods) {
+    judgedPeriods.push_back(judgedAs(period, description_.period));
+  }
   std::vector<PeriodSeries> observations;
   for (const std::size_t i : shownMeasures_) {
     observations.push_back(
-        readPeriodObservations(series_.observation(i), description_.measures[i], description_.period));
-    keepCounted(observations.back(), description_.measures[i], description_.period);
+        readPeriodObservations(series_.observation(i), description_.measures[i], shownPeriod_));
+    keepCounted(observations.back(), description_.measures[i], description_.period, judgedPeriods);
   }
   return observations;
 }
@@ -154,14 +178,18 @@ EvaluationResult OutputReader::read(const OutputFiles& files) {
                                               trimTrailing(description_.objectives[i].name), formatReal(*objective))));
   }
   result.aggregate = aggregator_.aggregate(result.objectiveValues);
+  for (const Validated& one : validated_) {
+    result.validationValues.push_back(
+        validationValue(one.measure, one.period, series_.simulation(one.index), series_.observation(one.index)));
+  }
   return result;
 }
 
 std::vector<PeriodSeries> OutputReader::readShownSeries() {
   std::vector<PeriodSeries> shown;
   for (const std::size_t i : shownMeasures_) {
-    shown.push_back(readMatchedSeries(series_.simulation(i), series_.observation(i), description_.measures[i],
-                                      description_.period));
+    shown.push_back(
+        readMatchedSeries(series_.simulation(i), series_.observation(i), description_.measures[i], shownPeriod_));
   }
   return shown;
 }
@@ -170,6 +198,7 @@ EvaluationResult OutputReader::failedResult(EvaluationFailure failure) const {
   EvaluationResult result;
   result.measureValues.assign(description_.measures.size(), kFailedRunValue);
   result.objectiveValues.assign(description_.objectives.size(), kFailedRunValue);
+  result.validationValues.assign(validated_.size(), std::nan(""));
   result.failure = std::move(failure);
   return result;
 }

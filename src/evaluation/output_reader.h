@@ -56,7 +56,8 @@ class OutputReader final {
   /// The observations of every measure of interface type 0, with the steps of its simulated series if values are kept
   /// there; empty unless simulated values are kept.
   const std::vector<ObservedSeries>& observedSeries() const { return observedSeries_; }
-  /// The measures whose simulated series a result may hold, 0-based: one per pair of series that is compared.
+  /// The measures whose simulated series a result may hold, 0-based: one per pair of series that is compared. Series
+  /// that are shown begin and end with the first and the last of the evaluation and validation periods.
   const std::vector<std::size_t>& shownMeasures() const { return shownMeasures_; }
   /// The observed series of each of shownMeasures().
   std::vector<PeriodSeries> readShownObservations();
@@ -66,9 +67,16 @@ class OutputReader final {
   /// A comparison of model runs with the first successful one, for the evaluations of a run.
   RunComparison runComparison() const;
   /// What the user should know of the files as they were found.
-  const std::vector<std::string>& warnings() const { return series_.warnings(); }
+  const std::vector<std::string>& warnings() const { return warnings_; }
 
  private:
+  /// A measure in a validation period.
+  struct Validated {
+    std::size_t index = 0;  ///< of the measure
+    OutputMeasure measure;
+    EvaluationPeriod period;
+  };
+  void prepareValidation();
   static std::optional<EvaluationFailure> findMissing(const OutputFiles& files);
   /// Fills in the measures and simulated values and leaves the series open; returns a failure if the model's output
   /// cannot be used.
@@ -83,6 +91,9 @@ class OutputReader final {
   std::vector<MeasureSource> sources_;
   SeriesTables series_;
   std::vector<std::size_t> shownMeasures_;
+  EvaluationPeriod shownPeriod_;
+  std::vector<Validated> validated_;
+  std::vector<std::string> warnings_;
   std::size_t numbersNeeded_ = 0;    ///< in the output-measure file
   std::uintmax_t usualNumbers_ = 0;  ///< size of that file as it was found at the start
   std::vector<ObservedSeries> observedSeries_;

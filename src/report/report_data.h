@@ -14,6 +14,7 @@
 #include "run/results/run_record.h"
 #include "run/results/scenario_series.h"
 #include "run/results/series_table.h"
+#include "run/results/validation_table.h"
 
 namespace mirevo {
 
@@ -137,6 +138,16 @@ struct ReportedSensitivity {
   std::optional<ReportedCovariance> covariance;
 };
 
+/// The evaluation period or a validation period.
+struct ReportedPeriod {
+  std::string name;
+  std::string start;
+  std::string end;
+  std::int64_t first = 0;  ///< secondNumber() of its ends
+  std::int64_t last = 0;
+  bool isValidation = false;
+};
+
 struct ReportData {
   std::string program;
   ReportedRun run;
@@ -156,6 +167,9 @@ struct ReportData {
   std::vector<SeriesLabel> seriesLabels;  ///< one per series
   std::vector<ScenarioSeries> scenarioSeries;
   std::vector<std::string> runNames;  ///< of the evaluations, from the first on; empty where one has none
+  std::vector<ReportedPeriod> periods;  ///< the evaluation period, and those of validation; empty without any of these
+  ValidationTable validation;
+  std::vector<ShownSeries> wholeSeries;  ///< `series` from the first to the last period; empty without `periods`
   std::vector<ReportedBand> bands;
   std::optional<ReportedSensitivity> sensitivity;
   std::vector<std::string> summary;  ///< the closing lines of the result file

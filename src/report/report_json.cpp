@@ -11,6 +11,7 @@
 #include "report/drawn_lines.h"
 #include "report/hydrograph_views.h"
 #include "report/json_writer.h"
+#include "report/report_validation.h"
 #include "report/thinning.h"
 
 namespace mirevo {
@@ -193,18 +194,59 @@ void writeScenarios(JsonWriter& json, const ReportData& data, const std::string&
   json.endArray();
 }
 
+void writePeriod(JsonWriter& json, const ReportedPeriod& period) {
+  json.member("name", period.name).member("start", period.start).member("end", period.end);
+  json.member("kind", period.isValidation ? "validation" : "calibration");
+}
+
+/// The periods with the figures of the best evaluation in each; `whole` reaches over all of them.
+void writePeriodsOf(JsonWriter& json, const ReportData& data, const ShownSeries& whole) {
+  json.key("periods").beginArray();
+  for (const ReportedPeriod& period : data.periods) {
+    writePeriod(json.beginObject(), period);
+    json.key("first").integer(epochMilliseconds(period.first)).key("last").integer(epochMilliseconds(period.last));
+    const ShownSeries part = partOf(whole, period.first, period.last);
+    if (data.series.best) writeFigures(json, "best", fitFigures(part.best, part.observed));
+    json.endObject();
+  }
+  json.endArray();
+}
+
+void writeValidation(JsonWriter& json, const ReportData& data) {
+  const ValidationTable& table = data.validation;
+  if (table.measures.empty()) return;
+  json.key("validation").beginObject().member("best", table.bestNumber).member("tenth", table.tenth);
+  json.member("count", table.count).key("periods").beginArray();
+  for (const ReportedPeriod& period : data.periods) {
+    writePeriod(json.beginObject(), period);
+    json.endObject();
+  }
+  json.endArray().key("measures").beginArray();
+  for (std::size_t i = 0; i < table.measures.size(); ++i) {
+    json.beginObject().member("name", table.names[i]);
+    json.member("statistic", data.measures[table.measures[i]].statistic).key("values").beginArray();
+    for (const ValidationRange& range : table.values[i]) {
+      json.beginObject().member("best", range.best).member("least", range.least);
+      json.member("median", range.median).member("largest", range.largest).endObject();
+    }
+    json.endArray().endObject();
+  }
+  json.endArray().endObject();
+}
+
 void writeSeries(JsonWriter& json, const ReportData& data) {
   json.key("series").beginArray();
-  for (const ShownSeries& series : data.series.series) {
+  for (std::size_t place = 0; place < data.series.series.size(); ++place) {
+    const ShownSeries& series = data.series.series[place];
+    const ShownSeries& whole = place < data.wholeSeries.size() ? data.wholeSeries[place] : series;
     json.beginObject().member("measure", series.measure);
-    const auto place = static_cast<std::size_t>(&series - data.series.series.data());
     if (place < data.seriesLabels.size()) {
       json.optionalMember("quantity", data.seriesLabels[place].quantity);
       json.optionalMember("unit", data.seriesLabels[place].unit);
     }
     const std::size_t most = mostDrawnTimes(data.series.series.size());
-    const bool isThinned = series.seconds.size() > most;
-    const ShownSeries& drawn = isThinned ? thinned(series, most) : series;
+    const bool isThinned = whole.seconds.size() > most;
+    const ShownSeries& drawn = isThinned ? thinned(whole, most) : whole;
     writeTimes(json, drawn.seconds);
     json.key("observed").numbers(drawn.observed, Digits::drawn);
     if (data.series.initial) json.key("initial").numbers(drawn.initial, Digits::drawn);
@@ -213,12 +255,13 @@ void writeSeries(JsonWriter& json, const ReportData& data) {
     }
     json.key("period").beginArray().integer(epochMilliseconds(data.periodFirst));
     json.integer(epochMilliseconds(data.periodLast)).endArray();
+    if (!data.periods.empty()) writePeriodsOf(json, data, whole);
     json.key("figures").beginObject();
     if (data.series.initial) writeFigures(json, "initial", fitFigures(series.initial, series.observed));
     if (data.series.best) writeFigures(json, "best", fitFigures(series.best, series.observed));
     json.endObject().member("thinned", isThinned);
     if (isThinned) writeFlowDuration(json, series);
-    writeDrawnLines(json, series);
+    writeDrawnLines(json, whole);
     writeScenarios(json, data, series.measure);
     if (place < data.above.size() && data.above[place]) writeAbove(json, *data.above[place]);
     writeHydrographViews(json, series, dateOfSecond(data.periodFirst)[date_field::kMonth]);
@@ -330,6 +373,7 @@ std::string reportJson(const ReportData& data) {
   writeFailures(json, data);
   writeEvaluations(json, data.evaluations);
   writeSeries(json, data);
+  writeValidation(json, data);
   writeBands(json, data);
   if (data.sensitivity) writeSensitivity(json, *data.sensitivity);
   json.member("summary", data.summary).endObject();

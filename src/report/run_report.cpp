@@ -29,6 +29,7 @@
 #include "report/report_analyses.h"
 #include "report/report_file.h"
 #include "report/report_parameters.h"
+#include "report/report_validation.h"
 #include "report/run_sources.h"
 #include "run/results/restart_settings.h"
 #include "run/setup/setup_summary.h"
@@ -131,6 +132,7 @@ ReportData ReportBuilder::build() {
   noteDifferencesOfBest();
   addFailures();
   addSeries();
+  addValidation(config_, sources_.results.rows, best_, data_);
   addAnalyses();
   return std::move(data_);
 }

@@ -250,6 +250,7 @@ void RunDriver::openResults() {
                                             parameters_->searchSpace(), results_->simulatedValues(), &results_->pairs(),
                                             &results_->unkeptFiles(), runner_->output().sources());
   reporter_->keepSettings(results_->settings());
+  if (!config_.validationPeriods.empty()) reporter_->keepJudged();
   EarlierEvaluations* const earlier = results_->earlierEvaluations();
   series_ = openSeries(config_, parameters_->searchSpace(), runner_->output(),
                        runFilePath(filePrefix_, run_files::kSeries), earlier != nullptr, state_.log);
@@ -299,7 +300,8 @@ TaskContext RunDriver::taskContext() {
           [this](std::span<const double> variable) { return otherValueTexts(*parameters_, variable); },
           [this](std::span<const int> numbers, std::size_t first, std::size_t count) {
             return results_->simulatedValues()->columns(numbers, first, count);
-          }};
+          },
+          config_.validationPeriods};
 }
 
 TaskOutcome RunDriver::runTask() {
@@ -368,7 +370,8 @@ std::optional<RunDriver::Unwritten> RunDriver::closeResults(const Ending& ending
   if (reporter_) reporter_->settle(*aggregator_);
   if (series_) series_->finish(reporter_->best());
   std::vector<std::string> lines{ending.closingLine, "Ended: " + ending.time};
-  if (reporter_) addFindings(*reporter_, *aggregator_, *parameters_, config_.measures, lines);
+  if (reporter_)
+    addFindings(*reporter_, *aggregator_, *parameters_, config_.measures, config_.validationPeriods, lines);
   lines.insert(lines.end(), report.begin(), report.end());
   const EndingSignalsHeld held;
   signalState.resultFileDescriptor = -1;
@@ -467,6 +470,9 @@ void RunDriver::logDifferences() {
   if (const std::string text = reporter_->absentWarning(); !text.empty()) state_.log.warning(text);
   for (const std::string& text : reporter_->differencesOfBest()) state_.log.warning(text);
   if (const auto text = reporter_->processesLeftWarning()) state_.log.warning(*text);
+  const std::vector<std::string> lines = validationFindings(*reporter_, config_.measures, config_.validationPeriods);
+  if (!lines.empty()) state_.log.line("");
+  for (const std::string& line : lines) state_.log.line(line);
 }
 
 /// After the message that ends an unfinished run, which is the first thing that the user reads.

@@ -1,6 +1,7 @@
 #include "run/run_findings.h"
 
 #include <cstddef>
+#include <utility>
 
 #include <fmt/core.h>
 
@@ -11,8 +12,15 @@
 
 namespace mirevo {
 
+std::vector<std::string> validationFindings(const RunReporter& reporter, std::span<const OutputMeasure> measures,
+                                            std::span<const ValidationPeriod> periods) {
+  if (!reporter.best() || periods.empty()) return {};
+  return validationLines(validationTable(measures, periods, reporter.judged(), reporter.best()->number));
+}
+
 void addFindings(const RunReporter& reporter, const ObjectiveAggregator& aggregator, ParameterModel& parameters,
-                 std::span<const OutputMeasure> measures, std::vector<std::string>& lines) {
+                 std::span<const OutputMeasure> measures, std::span<const ValidationPeriod> periods,
+                 std::vector<std::string>& lines) {
   if (reporter.best()) {
     const std::vector<std::string> scales = aggregator.scaleLines();
     lines.insert(lines.end(), scales.begin(), scales.end());
@@ -28,6 +36,7 @@ void addFindings(const RunReporter& reporter, const ObjectiveAggregator& aggrega
       if (isCriterion(measure))
         lines.push_back(fmt::format("Statistic of {}: {}", measure.name, statisticWithBest(measure)));
     }
+    for (std::string& line : validationFindings(reporter, measures, periods)) lines.push_back(std::move(line));
     for (const std::string& text : reporter.differencesOfBest()) lines.push_back("Warning: " + text);
   }
   const std::vector<std::string> compared = reporter.comparisonLines();

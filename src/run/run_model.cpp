@@ -20,6 +20,7 @@ ModelDescription describeModel(const RunConfig& config) {
   model.measures = config.measures;
   if (config.readsMeasureFile()) model.measureFile = config.measureFile;
   model.period = config.period;
+  model.validationPeriods = config.validationPeriods;
   model.minimumCoverage = config.minimumCoverage;
   model.objectives = config.objectives;
   for (const SavedOutputFile& file : config.savedOutputFiles) model.savedFiles.push_back(file.fileName);

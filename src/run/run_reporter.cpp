@@ -273,6 +273,10 @@ void RunReporter::count(const std::vector<double>& parameterValues, const Evalua
     return;
   }
   initial_.consider(result.number, parameterValues);
+  if (keepsJudged_) {
+    judged_[result.number] = {result.number, result.aggregate, parameterValues, result.measureValues,
+                              result.validationValues};
+  }
   if (std::isnan(result.aggregate)) {
     unsettled_.push_back({result.number, parameterValues, result.objectiveValues});
   } else if (!result.objectiveValues.empty()) {
@@ -310,6 +314,12 @@ void RunReporter::requireLogWritten() const {
   fatalError("Error: Unable to write to " + state_.log.path(), state_.log.writeError());
 }
 
+std::vector<JudgedEvaluation> RunReporter::judged() const {
+  std::vector<JudgedEvaluation> evaluations;
+  for (const auto& [number, evaluation] : judged_) evaluations.push_back(evaluation);
+  return evaluations;
+}
+
 void RunReporter::takeBestOf(const SearchSummary& search) {
   searchHasEnded_ = true;
   if (search.best.empty() || !search.bestResult.ok()) return;
@@ -331,6 +341,7 @@ void RunReporter::settle(const ObjectiveAggregator& aggregator) {
   for (const Unsettled& evaluation : unsettled_) {
     const double aggregate = aggregator.aggregate(evaluation.objectiveValues);
     results_.replaceAggregate(evaluation.number, aggregate);
+    if (keepsJudged_) judged_[evaluation.number].aggregate = aggregate;
     if (recorder_ != nullptr) recorder_->aggregateSettled(evaluation.number, aggregate);
     considerAsBest(evaluation.number, aggregate, evaluation.parameterValues, dateAndTimeWithZone());
   }

@@ -21,6 +21,7 @@
 #include "run/results/series_recorder.h"
 #include "run/results/simulated_values_file.h"
 #include "run/results/unkept_files.h"
+#include "run/results/validation_table.h"
 #include "run/run_state.h"
 
 namespace mirevo {
@@ -38,6 +39,11 @@ class RunReporter final : public EvaluationObserver {
   /// From now on `recorder` records the series of the initial and the best evaluation; it must outlive the reporter.
   void recordSeries(SeriesRecorder& recorder) { recorder_ = &recorder; }
   void recordScenarios(ScenarioSeriesFile& file) { scenarioSeries_ = &file; }
+
+  /// From now on evaluations are kept for judged(), in a run with validation periods.
+  void keepJudged() { keepsJudged_ = true; }
+  /// The successful evaluations by their numbers.
+  std::vector<JudgedEvaluation> judged() const;
 
   /// From now on `settings` are on disk whenever a row is written; they must outlive the reporter.
   void keepSettings(RestartSettingsFile& settings) { settings_ = &settings; }
@@ -125,6 +131,8 @@ class RunReporter final : public EvaluationObserver {
   BestChoice best_;
   InitialChoice initial_;
   std::vector<Unsettled> unsettled_;
+  bool keepsJudged_ = false;
+  std::map<int, JudgedEvaluation> judged_;
   int evaluationCount_ = 0;
   int failedCount_ = 0;
   int replayedCount_ = 0;

@@ -82,12 +82,17 @@ std::unique_ptr<SeriesRecorder> openSeries(const RunConfig& config, const Search
   run.headLines = {
       columnName(config.title), fmt::format("Mirevo {}", programVersion()), "Setup file: " + config.setupFile,
       fmt::format("Evaluation period: {} to {}", formatDate(config.period.start), formatDate(config.period.end))};
+  for (const ValidationPeriod& period : config.validationPeriods) {
+    run.headLines.push_back(fmt::format("Validation period {}: {} to {}", columnName(period.name),
+                                        formatDate(period.start), formatDate(period.end)));
+  }
   const std::string task = config.task ? std::string(config.task->facts().name.name) : std::string();
   run.task = task;
   run.measures = seriesNames(config.measures, output.shownMeasures());
   run.observations = output.readShownObservations();
-  run.periodFirst = secondNumber(config.period.start);
-  run.periodLast = secondNumber(config.period.end);
+  const EvaluationPeriod shown = hullOf(config.period, config.validationPeriods);
+  run.periodFirst = secondNumber(shown.start);
+  run.periodLast = secondNumber(shown.end);
   run.largestGap = config.period.largestGapDays();
   warnOfLastDay(config, output, log);
   run.initialValues = ToModelScale(space, space.initial);

@@ -218,6 +218,8 @@ UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome, const
       successful.size(), [&](std::size_t i) -> auto& { return successful[i]->measureValues; });
   summary.objectives = summariseColumns(
       successful.size(), [&](std::size_t i) -> auto& { return successful[i]->objectiveValues; });
+  summary.validation = summariseColumns(
+      successful.size(), [&](std::size_t i) -> auto& { return successful[i]->validationValues; });
   return summary;
 }
 
@@ -241,6 +243,7 @@ std::vector<DataTable> uncertaintyTables(const UncertaintySummary& summary, cons
   add("parameter", names.parameters, summary.parameters);
   add("measure", names.measures, summary.measures);
   add("objective", names.objectives, summary.objectives);
+  add("validation", names.validation, summary.validation);
   return {std::move(table),
           matrixTable(run_files::kSampleCorrelation, "Correlation of the parameters of all sets evaluated, model scale",
                       names.parameters, summary.correlations)};
@@ -254,6 +257,7 @@ std::vector<std::string> formatUncertainty(const UncertaintySummary& summary, co
   appendSummaries(lines, "Parameter (model scale)", names.parameters, summary.parameters);
   appendSummaries(lines, "Output measure", names.measures, summary.measures);
   appendSummaries(lines, "Objective function", names.objectives, summary.objectives);
+  if (!names.validation.empty()) appendSummaries(lines, "Validation", names.validation, summary.validation);
   lines.emplace_back();
   for (std::string& line :
        formatCorrelation("Sample correlation", names.parameters, summary.correlations, correlationFile)) {

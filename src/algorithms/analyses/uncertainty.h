@@ -89,6 +89,7 @@ struct AnalysisNames {
   std::vector<std::string> parameters;
   std::vector<std::string> measures;
   std::vector<std::string> objectives;
+  std::vector<std::string> validation = {};  ///< measures in validation periods
 };
 
 struct UncertaintySummary {
@@ -98,6 +99,7 @@ struct UncertaintySummary {
   std::vector<std::vector<double>> correlations;  ///< of the same values
   std::vector<SampleSummary> measures;
   std::vector<SampleSummary> objectives;
+  std::vector<SampleSummary> validation;  ///< of measures in validation periods
 };
 
 UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome, const SearchSpace& space);

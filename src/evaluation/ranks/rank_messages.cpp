@@ -52,9 +52,9 @@ struct Layout<FailureMessage> {
 template <>
 struct Layout<EvaluationResult> {
   static void of(auto& archive, auto& result) {
-    archive(result.measureValues, result.objectiveValues, result.aggregate, result.exactMeasures,
-            result.simulatedValues, result.failure, result.unusedObservations, result.pairs, result.lastOutput,
-            result.warnings, result.unkeptFiles, result.absentFiles, result.shownSeries);
+    archive(result.measureValues, result.objectiveValues, result.aggregate, result.validationValues,
+            result.exactMeasures, result.simulatedValues, result.failure, result.unusedObservations, result.pairs,
+            result.lastOutput, result.warnings, result.unkeptFiles, result.absentFiles, result.shownSeries);
   }
 };
 template <>

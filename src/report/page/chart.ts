@@ -8,7 +8,7 @@ import {
 } from 'echarts/components';
 import { init, use, type ECharts, type EChartsCoreOption } from 'echarts/core';
 import { CanvasRenderer, SVGRenderer } from 'echarts/renderers';
-import { make, table } from './dom';
+import { make, shorten, table } from './dom';
 import { csvOf, download, drawnValues, fileNameOf, wellFormed, type Values } from './figure_files';
 import { count, tick } from './format';
 import { kPaperLook, look, onLookChange, setPrinting, type Look } from './look';
@@ -35,6 +35,7 @@ export interface ChartPlan {
   height: number;
   small?: boolean; // several side by side
   zoom?: 'x' | 'xy';
+  spans?: { label: string; first: number; last: number }[]; // of the x axis, each with a button that zooms to it
   switches?: Switch[];
   /** What to draw. `is(key)`: whether that switch is on. */
   option: (look: Look, is: (key: string) => boolean, width?: number) => Option;
@@ -141,6 +142,11 @@ class Drawn {
       this.chart.resize({ width: this.canvas.clientWidth });
       this.chart.getZr().flush();
     }
+  }
+
+  zoomTo(first: number, last: number): void {
+    this.draw();
+    this.chart!.dispatchAction({ type: 'dataZoom', dataZoomIndex: 0, startValue: first, endValue: last });
   }
 
   resetZoom(): void {
@@ -358,6 +364,9 @@ export function chart(plan: ChartPlan): Chart {
       },
     }, item.label);
     tools.append(button);
+  }
+  for (const { label, first, last } of plan.spans ?? []) {
+    tools.append(make('button', { type: 'button', title: `Zoom to ${label}`, onclick: () => drawn.zoomTo(first, last) }, shorten(label, 24)));
   }
   if (plan.zoom) {
     canvas.addEventListener('keydown', (event) => drawn.zoomByKey(event));

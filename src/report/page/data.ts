@@ -125,6 +125,23 @@ export interface Scenario extends Times {
   breaks?: number[];
 }
 
+/** The evaluation period or a validation period. */
+export interface Period {
+  name: string;
+  start: string; // as in the log
+  end: string;
+  kind: 'calibration' | 'validation';
+}
+
+/** Calibration and validation side by side; `values` has one entry per period. */
+export interface Validation {
+  best: number; // evaluation
+  tenth: number; // evaluations in the best tenth; 0: none is told apart
+  count: number; // of which it is the tenth
+  periods: Period[];
+  measures: { name: string; statistic: string; values: { best: Maybe; least: Maybe; median: Maybe; largest: Maybe }[] }[];
+}
+
 /** A simulated and an observed series. */
 export interface Series extends Times {
   measure: string; // names of all measures that compare the two
@@ -138,6 +155,7 @@ export interface Series extends Times {
   observedAsPoints?: boolean; // too few or too uneven for a line
   breaks?: { [column: string]: number[] }; // milliseconds of the values behind which a line is interrupted, per column
   period?: [number, number] | null;
+  periods?: (Period & { first: number; last: number; best?: Figures | null })[]; // in a run with validation periods
   thinned?: boolean; // reduced to the extremes of short spans; figures and `flowDuration` are computed from all values
   flowDuration?: FlowDuration;
   figures?: { initial?: Figures | null; best?: Figures | null };
@@ -199,6 +217,7 @@ export interface ReportData {
   failures: Failure[];
   evaluations: Evaluations;
   series: Series[];
+  validation?: Validation | null;
   band: Band[];
   sensitivity: Sensitivity | null;
   summary: string[];

@@ -12,6 +12,7 @@ import type { Section } from './sections/section';
 import { sensitivitySection } from './sections/sensitivity';
 import { seriesSection } from './sections/series';
 import { bandSection, distributionSection } from './sections/uncertainty';
+import { validationSection } from './sections/validation';
 
 function sections(data: ReportData): Section[] {
   const { task } = data.run;
@@ -19,6 +20,7 @@ function sections(data: ReportData): Section[] {
   const all = [
     bandSection(data),
     sensitivitySection(data),
+    validationSection(data),
     seriesSection(data),
     parameterSection(data),
     resultSection(data),

@@ -239,6 +239,7 @@ std::map<int, EarlierEvaluations::Record> earlierRecords(EarlierRun& run,
     record.result.number = row.number;
     record.result.measureValues = row.measures;
     record.result.objectiveValues = row.objectives;
+    record.result.validationValues = row.validation;
     if (const auto found = pairs.find(row.number); found != pairs.end()) record.result.pairs = found->second;
     if (!row.ok) {
       record.result.failure = failures.at(row.number);

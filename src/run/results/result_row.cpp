@@ -22,7 +22,7 @@ template <class Row, class Columns, class Visit>
 bool visitColumns(Row& row, const Columns& columns, Visit&& visit) {
   return visit(row.number, "Evaluation") && visit(row.ok, "Status") && visit(row.parameters, columns.parameters) &&
          visit(row.measures, columns.measures) && visit(row.objectives, columns.objectives) &&
-         visit(row.aggregate, "Aggregate");
+         visit(row.aggregate, "Aggregate") && visit(row.validation, columns.validation);
 }
 
 void addCell(std::string& line, std::string_view cell) {
@@ -132,13 +132,18 @@ ResultColumns resultColumns(const RunConfig& config, const SearchSpace& space) {
   columns.parameters = space.names;
   for (const OutputMeasure& measure : config.measures) columns.measures.push_back(measure.name);
   for (const ObjectiveFunction& objective : config.objectives) columns.objectives.push_back(objective.name);
+  columns.validation = validationNames(config.measures, config.validationPeriods);
   return columns;
 }
 
 ResultRow resultRow(std::span<const double> parameterValues, const EvaluationResult& result) {
-  return {
-      result.number,          result.ok(),     {parameterValues.begin(), parameterValues.end()}, result.measureValues,
-      result.objectiveValues, result.aggregate};
+  return {result.number,
+          result.ok(),
+          {parameterValues.begin(), parameterValues.end()},
+          result.measureValues,
+          result.objectiveValues,
+          result.aggregate,
+          result.validationValues};
 }
 
 std::string resultHeader(const ResultColumns& columns) {

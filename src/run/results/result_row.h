@@ -18,6 +18,7 @@ struct ResultColumns {
   std::vector<std::string> parameters;  ///< variable parameters
   std::vector<std::string> measures;
   std::vector<std::string> objectives;
+  std::vector<std::string> validation = {};  ///< measures in validation periods
 };
 
 /// One evaluation in a result file. result_row.cpp defines its columns, for writing and reading alike.
@@ -28,6 +29,7 @@ struct ResultRow {
   std::vector<double> measures;
   std::vector<double> objectives;
   double aggregate = kFailedRunValue;
+  std::vector<double> validation = {};
   std::size_t line = 0;  ///< of a row that was read: the line of its file, from 1
 };
 

@@ -133,6 +133,13 @@ const SectionRow& listSection(std::string_view path) {
          }) {
       lists.emplace(list, SectionRow{list, "always", meaning, {itemCount(least)}});
     }
+    constexpr std::string_view kValidation = "ObjectiveFunctions/VALIDATION_PERIODS";
+    lists.emplace(kValidation,
+                  SectionRow{kValidation,
+                             "if the setup has it",
+                             "Periods in which the measures that compare series are computed as well, for every "
+                             "evaluation, without bearing on the objective functions or the search.",
+                             {itemCount(0)}});
     return lists;
   }();
   return rows.at(path);
@@ -314,6 +321,24 @@ const SettingSection<RunConfig>& judgementSection() {
                                                           "observations count for no output measure. Shorter than "
                                                           "the period."}),
                            [](const RunConfig& config) { return validateWarmUp(config.period); })}}};
+  return section;
+}
+
+const SettingSection<ValidationPeriod>& validationPeriodSection() {
+  using Period = ValidationPeriod;
+  static const SettingSection<ValidationPeriod> section{
+      {"ObjectiveFunctions/VALIDATION_PERIODS/VALIDATION_n",
+       "for each item",
+       "A period that tests the calibration.",
+       {setting<&Period::name>({.name = "Name",
+                                .defaultValue = "''",
+                                .meaning = "Unique name, in the columns of the result file, the log and the report; "
+                                           "blank: its dates."}),
+        setting<&Period::start>({.name = "Start_Date", .meaning = "Start of the period, inclusive."}),
+        checked<Period>(setting<&Period::end>({.name = "End_Date",
+                                               .meaning = "End of the period, inclusive; a date alone means its "
+                                                          "00:00. Not before the start."}),
+                        [](const Period& period) { return validateValidationPeriod(period); })}}};
   return section;
 }
 

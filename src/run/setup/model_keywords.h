@@ -28,6 +28,7 @@ const SettingSection<ModelParameter>& keyLinesSection();
 const SettingSection<ModelParameter>& parameterSection();
 const SettingSection<InternalConstraint>& constraintSection();
 const SettingSection<RunConfig>& judgementSection();
+const SettingSection<ValidationPeriod>& validationPeriodSection();
 const SettingSection<OutputMeasure>& measureSection();
 const SettingSection<OutputMeasure>& simulationFileSection();
 const SettingSection<OutputMeasure>& observationFileSection();

@@ -7,6 +7,7 @@
 
 #include "measures/objective_functions.h"
 #include "measures/output_measure.h"
+#include "measures/validation_period.h"
 #include "parameters/model_parameter.h"
 #include "parameters/template_file.h"
 #include "platform/processes/process_launcher.h"
@@ -41,6 +42,7 @@ struct RunConfig {
   std::vector<ModelParameter> parameters;
   std::vector<InternalConstraint> constraints;
   EvaluationPeriod period;
+  std::vector<ValidationPeriod> validationPeriods;  ///< each with a name of its own
   AggregationMethod aggregationMethod = AggregationMethod::none;
   double minimumCoverage = 0.0;  ///< share of the first successful run's pairs below which a model run fails
   std::vector<OutputMeasure> measures;

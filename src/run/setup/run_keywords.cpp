@@ -123,6 +123,8 @@ const SetupSchema& setupSchema() {
                                         &listSection("MODEL_PARAMETERS/INTERNAL_CONSTRAINTS"),
                                         &constraintSection().row,
                                         &judgementSection().row,
+                                        &listSection("ObjectiveFunctions/VALIDATION_PERIODS"),
+                                        &validationPeriodSection().row,
                                         &listSection("ObjectiveFunctions/OUTPUT_MEASURES"),
                                         &measureSection().row,
                                         &simulationFileSection().row,

@@ -11,8 +11,10 @@
 
 #include <fmt/core.h>
 
+#include "common/calendar.h"
 #include "common/paths.h"
 #include "common/text.h"
+#include "measures/dates.h"
 #include "measures/statistics.h"
 #include "parameters/search_space.h"
 #include "run/setup/model_keywords.h"
@@ -218,6 +220,21 @@ void warnOfCoverage(const RunConfig& config, const SectionsRead& sections) {
   if (config.period.warmUpDays > 0.0) sections.judgement->warn("Warm_Up_Days", kReason);
 }
 
+void warnOfValidation(const RunConfig& config, const SectionsRead& sections) {
+  const bool hasSeries = !validationTargets(config.measures, config.validationPeriods).empty();
+  for (std::size_t i = 0; i < config.validationPeriods.size(); ++i) {
+    const ValidationPeriod& period = config.validationPeriods[i];
+    if (!hasSeries) {
+      sections.validationPeriods[i].warn("Start_Date", "without effect, no output measure compares series");
+    } else if (daysSince(config.period.start, period.end) >= 0.0 && daysSince(config.period.end, period.start) <= 0.0) {
+      sections.validationPeriods[i].warn(
+          "Start_Date", fmt::format("the validation period overlaps the evaluation period, {} to {}, and is no "
+                                    "independent test of it",
+                                    formatDate(config.period.start), formatDate(config.period.end)));
+    }
+  }
+}
+
 void warnOfProcessFolder(const RunConfig& config, const SectionsRead& sections) {
   if (config.processFolder.empty()) return;
   constexpr std::string_view kKeyword = "ProcessFolder";
@@ -242,6 +259,7 @@ void warnOfDoubtfulSettings(const RunConfig& config, const SectionsRead& section
   warnOfMeasureFile(config, sections);
   warnOfObjectives(config, sections);
   warnOfCoverage(config, sections);
+  warnOfValidation(config, sections);
   if (config.task && config.task->hasFinalRun()) warnOfSearch(config, sections);
   warnOfProcessFolder(config, sections);
 }

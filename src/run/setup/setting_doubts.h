@@ -14,6 +14,7 @@ struct SectionsRead {
   std::vector<SetupSection> parameterFiles;
   std::vector<SetupSection> parameters;
   std::optional<SetupSection> judgement;  ///< ObjectiveFunctions
+  std::vector<SetupSection> validationPeriods;
   std::vector<SetupSection> measures;
   std::vector<SetupSection> objectives;
   std::optional<SetupSection> measureFile;  ///< OUTPUT_MEASURE_FILE

@@ -99,6 +99,7 @@ class SetupReader final {
   void readModelParameters();
   void readInternalConstraints();
   void readObjectiveFunctions();
+  void readValidationPeriods(const SetupSection& parent);
   static void locateReference(const SetupSection& section, SeriesReference& reference);
   void readSeries(const SetupSection& section, OutputMeasure& measure) const;
   void connectMeasures();
@@ -245,6 +246,7 @@ void SetupReader::readObjectiveFunctions() {
   const SetupSection section = target_.open("ObjectiveFunctions");
   section.read(judgementSection(), config_);
   sections_.judgement = section;
+  readValidationPeriods(section);
 
   section.open("OUTPUT_MEASURES")
       .readItems("MEASURE_", measureSection(), config_.measures, "Error: No output measures defined",
@@ -264,6 +266,18 @@ void SetupReader::readObjectiveFunctions() {
           });
   connectMeasures();
   if (!config_.task || !config_.task->mayHaveInitialSample()) requireScales(false);
+}
+
+void SetupReader::readValidationPeriods(const SetupSection& parent) {
+  const auto list = parent.openIfPresent("VALIDATION_PERIODS");
+  if (!list) return;
+  NamesUsed names;
+  list->readItems("VALIDATION_", validationPeriodSection(), config_.validationPeriods,
+                  [&](const SetupSection& section, ValidationPeriod& period) {
+                    if (trim(period.name).empty()) period.name = namedByDates(period);
+                    section.require(validatePeriodName(period, names));
+                    sections_.validationPeriods.push_back(section);
+                  });
 }
 
 /// Files of series are opened when the whole setup has been read; what is wrong with them is then told with its

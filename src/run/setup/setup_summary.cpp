@@ -54,6 +54,9 @@ class Summary final {
       line("Observations count from {} on, after a warm-up of {} days", formatDate(endOfWarmUp(config_.period)),
            formatReal(config_.period.warmUpDays));
     }
+    for (const ValidationPeriod& period : config_.validationPeriods) {
+      line("Validation period {}: {} to {}", period.name, formatDate(period.start), formatDate(period.end));
+    }
     line("Output measures: {}", config_.measures.size());
     for (const OutputMeasure& measure : config_.measures) {
       line("  {}: {}, {}{}, objective function {}", measure.name, statisticWithBest(measure), weightText(measure),

@@ -25,6 +25,15 @@ std::optional<SettingRefusal> validateDate(const DateRecord& date, std::string_v
   return std::nullopt;
 }
 
+/// `kind` of the period: "evaluation".
+std::optional<SettingRefusal> validateDates(const DateRecord& start, const DateRecord& end, std::string_view kind) {
+  if (auto refusal = validateDate(start, "Start_Date")) return refusal;
+  if (auto refusal = validateDate(end, "End_Date")) return refusal;
+  if (daysSince(start, end) >= 0.0) return std::nullopt;
+  return SettingRefusal{fmt::format("Error: End date of the {} period before its start date", kind), "End_Date",
+                        fmt::format("expected {} or later, found {}", formatDate(start), formatDate(end))};
+}
+
 SettingRefusal refuseRepeated(std::string_view message, const std::string& name, std::string_view keyword,
                               std::string_view kind) {
   return {fmt::format("{} {}. Name used more than once.", message, name), keyword,
@@ -78,12 +87,16 @@ std::optional<SettingRefusal> validateEquations(const InternalConstraint& constr
 }
 
 std::optional<SettingRefusal> validateEvaluationPeriod(const EvaluationPeriod& period) {
-  if (auto refusal = validateDate(period.start, "Start_Date")) return refusal;
-  if (auto refusal = validateDate(period.end, "End_Date")) return refusal;
-  if (daysSince(period.start, period.end) >= 0.0) return std::nullopt;
-  return SettingRefusal{
-      "Error: End date of the evaluation period before its start date", "End_Date",
-      fmt::format("expected {} or later, found {}", formatDate(period.start), formatDate(period.end))};
+  return validateDates(period.start, period.end, "evaluation");
+}
+
+std::optional<SettingRefusal> validateValidationPeriod(const ValidationPeriod& period) {
+  return validateDates(period.start, period.end, "validation");
+}
+
+std::optional<SettingRefusal> validatePeriodName(const ValidationPeriod& period, NamesUsed& names) {
+  if (names.insert(period.name).second) return std::nullopt;
+  return refuseRepeated("Error: Invalid name of the validation period", period.name, "Name", "validation period");
 }
 
 std::optional<SettingRefusal> validateWarmUp(const EvaluationPeriod& period) {

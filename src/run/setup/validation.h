@@ -30,6 +30,9 @@ std::optional<SettingRefusal> validateWarmUp(const EvaluationPeriod& period);
 std::optional<SettingRefusal> validateSelection(const OutputMeasure& measure);
 /// That the measure's own period is inside the evaluation period and not all of it in the warm-up.
 std::optional<SettingRefusal> validateOwnPeriod(const OutputMeasure& measure, const EvaluationPeriod& period);
+std::optional<SettingRefusal> validateValidationPeriod(const ValidationPeriod& period);
+/// Checks that no earlier validation period has the name.
+std::optional<SettingRefusal> validatePeriodName(const ValidationPeriod& period, NamesUsed& names);
 /// Checks the number of the value in the output-measure file, for a measure of interface type 1.
 std::optional<SettingRefusal> validateMeasurementNumber(const OutputMeasure& measure);
 /// That the statistic leaves the choice of a transformation to the setup.

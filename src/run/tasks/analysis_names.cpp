@@ -3,7 +3,7 @@
 namespace mirevo {
 
 AnalysisNames analysisNames(const TaskContext& context) {
-  AnalysisNames names{context.space.names, {}, {}};
+  AnalysisNames names{context.space.names, {}, {}, validationNames(context.measures, context.validationPeriods)};
   for (const OutputMeasure& measure : context.measures) names.measures.push_back(measure.name);
   for (const ObjectiveFunction& objective : context.objectives) names.objectives.push_back(objective.name);
   return names;

@@ -19,6 +19,7 @@
 #include "measures/objective_functions.h"
 #include "measures/observed_series.h"
 #include "measures/output_measure.h"
+#include "measures/validation_period.h"
 #include "parameters/feasibility.h"
 #include "parameters/parameter_fields.h"
 #include "parameters/search_space.h"
@@ -76,6 +77,7 @@ struct TaskContext {
   /// SimulatedValuesFile::columns(), if the task readsSimulatedValues().
   std::function<std::vector<double>(std::span<const int> numbers, std::size_t first, std::size_t count)>
       simulatedColumns = {};
+  std::span<const ValidationPeriod> validationPeriods = {};
 };
 
 /// A file beside the results.

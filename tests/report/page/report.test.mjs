@@ -130,6 +130,25 @@ test('the views below a hydrograph are made when they are unfolded, and a series
   });
 });
 
+test('validation periods have a table, and the hydrograph a button for each', async () => {
+  const data = sample.dataOf('optimisation');
+  const [series] = data.series;
+  const [first, last] = series.period;
+  const middle = (first + last) / 2;
+  const period = (name, kind, from, to) => ({ name, start: 'a', end: 'b', kind, first: from, last: to, best: { n: 7, nse: 0.25 } });
+  series.periods = [period('Calibration', 'calibration', first, middle), period('<b>late', 'validation', middle, last)];
+  const value = { best: 0.125, least: 0.5, median: 0.625, largest: 0.75 };
+  data.validation = { best: 9, tenth: 3, count: 21, periods: series.periods, measures: [{ name: 'flow', statistic: 'NSE', values: [value, value] }] };
+  await withReport(data, {}, async (page) => {
+    const text = await page.locator('#validation').innerText();
+    for (const part of ['<b>late', 'best evaluation, 9', '0.125', 'median of the best tenth', '0.625', '3 of 21']) assert.ok(text.includes(part), part);
+    const figure = await page.$('#series figure');
+    await (await figure.$('text=<b>late')).click();
+    const [start, end] = await zoomOf(page, figure);
+    assert.ok(start > 40 && start < 60 && end > 95, `${start} to ${end}`);
+  });
+});
+
 test('the reader changes what dots are drawn against, and between light and dark', async () => {
   await withReport(sample.dataOf('optimisation'), { colorScheme: 'light' }, async (page) => {
     const ground = () => page.evaluate(() => getComputedStyle(document.body).backgroundColor);

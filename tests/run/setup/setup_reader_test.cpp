@@ -274,6 +274,14 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatAreSeldomMeant)
       {"Aggregation_Method = 0 => Aggregation_Method = 0\nMinimum_Coverage = 0.5", ""},
       {"Interface_Type = 0 => 1 & Aggregation_Method = 0 => Aggregation_Method = 0\nLargest_Gap = 3.0",
        "setup.kdx:61:15: Largest_Gap: has no effect, as no output measure compares series"},
+      {"Aggregation_Method = 0 => Aggregation_Method = 0\n[VALIDATION_PERIODS]\nTqSEKdxListItemCount = 1\n"
+       "[VALIDATION_1]\nStart_Date = 2004-01-01\nEnd_Date = 2005-12-31\n[/VALIDATION_1]\n"
+       "[/VALIDATION_PERIODS]",
+       "setup.kdx:64:14: Start_Date: the validation period overlaps the evaluation period, 2001-01-31 00:00 to "},
+      {"Aggregation_Method = 0 => Aggregation_Method = 0\n[VALIDATION_PERIODS]\nTqSEKdxListItemCount = 1\n"
+       "[VALIDATION_1]\nStart_Date = 2004-01-02\nEnd_Date = 2005-12-31\n[/VALIDATION_1]\n"
+       "[/VALIDATION_PERIODS]",
+       ""},
       {"Weight = 0.75 => Weight = 0.75\nStandard_Deviation = 2", "Standard_Deviation: has no effect with Aggregation_"},
       {"Weight = 0.75 => Weight = 0.75\nLocation = 2", "Location: has no effect with Aggregation_Method = 0"},
       {"Parameter_Equation = 'Depth + Rate' => Parameter_Equation = 'Depth + Rate'\nTransformation_Type = 2",

@@ -117,6 +117,16 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
        "expected whole numbers 1 to 12, found 0"},
       {"Weight = 1.25 => Lowest_Observed = 2\nHighest_Observed = 1",
        "Limits of the observed values invalid for output measure Flow error", "expected Lowest_Observed = 2 or more"},
+      {"Aggregation_Method = 0 => Aggregation_Method = 0\n[VALIDATION_PERIODS]\nTqSEKdxListItemCount = 1\n"
+       "[VALIDATION_1]\nStart_Date = 2005-02-01\nEnd_Date = 2005-01-31\n[/VALIDATION_1]\n"
+       "[/VALIDATION_PERIODS]",
+       "End date of the validation period before its start date",
+       "expected 2005-02-01 00:00 or later, found 2005-01-31 00:00"},
+      {"Aggregation_Method = 0 => Aggregation_Method = 0\n[VALIDATION_PERIODS]\nTqSEKdxListItemCount = 2\n"
+       "[VALIDATION_1]\nStart_Date = 2005-02-01\nEnd_Date = 2005-03-01\n[/VALIDATION_1]\n[VALIDATION_2]\n"
+       "Name = '2005-02-01 to 2005-03-01'\nStart_Date = 2006-01-01\nEnd_Date = 2007-01-01\n[/VALIDATION_2]\n"
+       "[/VALIDATION_PERIODS]",
+       "Invalid name of the validation period 2005-02-01 to 2005-03-01. Name used more than once.", "Name: expected"},
       {"MeasurementNo = 3 => 0", "Measurement No. invalid for output measure Written", "expected 1 or more"},
       {"'model/flow.csv' => ''", "No output file defined for output measure No. 1", "setup.kdx:71:23"},
       {"'gauge.csv' => ''", "No observation file defined for output measure No. 1", "File_Name"},

@@ -9,6 +9,7 @@ import { durationCurve, finite, spaced, thin } from '../numbers';
 import { logRange } from '../ticks';
 import { withSeriesAbove } from './above';
 import { grid, heading, type Section } from './section';
+import { kShadedNote, shadedPeriods, spansOf } from './validation';
 import { viewsOf } from './views';
 
 const kCurvePoints = 700;
@@ -90,10 +91,11 @@ function hydrographPlan(data: ReportData, series: Series): ChartPlan {
   const all = [series.observed, ...simulated.map(({ values }) => values)];
   return {
     title: 'Simulated and observed, and the residuals',
-    note: `Residual: ${judged ? shorten(judged.name, 60) : 'simulated'} less observed.${outside(times, series.period).length > 0 ? ' Shaded: outside the evaluation period.' : ''} ${series.thinned ? ' Of so many times the extremes of short spans are drawn.' : ''} Drag across the chart to zoom in, move the slider below to go along.`,
+    note: `Residual: ${judged ? shorten(judged.name, 60) : 'simulated'} less observed.${series.periods ? kShadedNote : outside(times, series.period).length > 0 ? ' Shaded: outside the evaluation period.' : ''} ${series.thinned ? ' Of so many times the extremes of short spans are drawn.' : ''} Drag across the chart to zoom in, move the slider below to go along.`,
     height: 492,
     zoom: 'x',
     thinned: series.thinned,
+    spans: spansOf(series),
     switches: [{ key: 'log', label: 'Log' }],
     option: (look, is) => {
       const style = lineStyles(look);
@@ -126,7 +128,7 @@ function hydrographPlan(data: ReportData, series: Series): ChartPlan {
         series: [
           ...lines.flatMap(({ key, name, line }) => drawnLine(name, line, is('log'), style[key].color, { lineStyle: style[key], z: key === 'best' ? 3 : 2 })),
           ...drawnLine('observed', isPoints ? { ...observed, times: [], values: [] } : observed, is('log'), style.observed.color,
-            { lineStyle: style.observed, z: 4, ...outsidePeriod(look, times, series.period) }),
+            { lineStyle: style.observed, z: 4, ...(series.periods ? shadedPeriods(look, series) : outsidePeriod(look, times, series.period)) }),
           ...(apart ? drawnLine('residual', isPoints ? { ...apart, times: [], values: [] } : apart, false, look.best,
             { ...below, lineStyle: { color: look.best, width: 1 }, areaStyle: { color: look.best, opacity: 0.2 } }) : []),
         ],

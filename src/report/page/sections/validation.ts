@@ -1,0 +1,64 @@
+// Calibration and validation side by side, and where the periods are in a hydrograph.
+import type { Figures, ReportData, Series } from '../data';
+import { table } from '../dom';
+import { count, number } from '../format';
+import type { Look } from '../look';
+import { heading, paragraph, type Section } from './section';
+
+export const kShadedNote = ' Shaded: the evaluation period (grey) and the validation periods (blue); a button zooms to each.';
+
+/** The periods of a hydrograph as areas. */
+export function shadedPeriods(look: Look, series: Series): object {
+  const data = (series.periods ?? []).map(({ kind, first, last }) => [
+    { xAxis: first, itemStyle: kind === 'calibration' ? { color: look.rule, opacity: 0.7 } : { color: look.band, opacity: 0.15 } },
+    { xAxis: last },
+  ]);
+  return { markArea: { silent: true, data } };
+}
+
+/** For a button that zooms to each. */
+export function spansOf(series: Series): { label: string; first: number; last: number }[] {
+  return (series.periods ?? []).map(({ name, first, last }) => ({ label: name, first, last }));
+}
+
+const kRows = [['least', 'least of the best tenth'], ['median', 'median of the best tenth'], ['largest', 'largest of the best tenth']] as const;
+
+function measuresTable(data: ReportData): Node[] {
+  const { validation } = data;
+  if (!validation) return [];
+  const { best, tenth, measures, periods } = validation;
+  const rows = measures.flatMap(({ name, statistic, values }) => [
+    [name, statistic, `best evaluation, ${count(best)}`, ...values.map((value) => number(value.best))],
+    ...(tenth > 0 ? kRows.map(([key, label]) => ['', '', label, ...values.map((value) => number(value[key]))]) : []),
+  ]);
+  return [
+    paragraph(`The objective functions are of the evaluation period alone (${periods[0]!.start} to ${periods[0]!.end}). In the validation periods the same model runs are judged by the same measures.${tenth > 0 ? ` The best tenth are ${count(tenth)} of ${count(validation.count)} different parameter sets, those with the smallest aggregates.` : ''}`),
+    table([{ title: 'Measure' }, { title: 'Statistic' }, { title: 'Of' },
+      ...periods.map(({ name, start, end }) => ({ title: name, hint: `${start} to ${end}`, number: true }))], rows, 'Calibration and validation'),
+  ];
+}
+
+const kFigures: [keyof Figures, string, string][] = [
+  ['nse', 'NSE', 'Nash-Sutcliffe efficiency; 1 is perfect'],
+  ['kge', 'KGE', 'Kling-Gupta efficiency (2009); 1 is perfect'],
+  ['pbias', 'Bias (%)', 'positive is too much; 0 is perfect'],
+  ['rmse', 'RMSE', 'root mean square error, in the unit of the series; 0 is perfect'],
+  ['r2', 'r\u00b2', 'square of the correlation; 1 is perfect'],
+  ['n', 'Values', 'compared values in the period'],
+];
+
+function figuresTable(series: Series): Node[] {
+  const rows = (series.periods ?? []).filter(({ best }) => best).map(({ name, best }) =>
+    [name, ...kFigures.map(([key]) => number(best![key], key === 'n' ? 9 : 4))]);
+  if (rows.length === 0) return [];
+  return [
+    heading(series.measure),
+    table([{ title: `Best evaluation${series.bestNumber == null ? '' : `, ${count(series.bestNumber)}`}` }, ...kFigures.map(([, title, hint]) => ({ title, hint, number: true }))],
+      rows, `Figures of ${series.measure} in each period`),
+  ];
+}
+
+export function validationSection(data: ReportData): Section | null {
+  const content = [...measuresTable(data), ...data.series.flatMap(figuresTable)];
+  return content.length === 0 ? null : { id: 'validation', title: 'Calibration and validation', content };
+}

@@ -1,0 +1,46 @@
+#include "report/report_validation.h"
+
+#include <algorithm>
+#include <cstddef>
+#include <type_traits>
+#include <utility>
+
+#include "common/calendar.h"
+
+namespace mirevo {
+namespace {
+
+ReportedPeriod reportedPeriod(std::string name, const DateRecord& start, const DateRecord& end, bool isValidation) {
+  return {std::move(name), formatDate(start), formatDate(end), secondNumber(start), secondNumber(end), isValidation};
+}
+
+}  // namespace
+
+ShownSeries partOf(const ShownSeries& series, std::int64_t first, std::int64_t last) {
+  const auto begin = std::lower_bound(series.seconds.begin(), series.seconds.end(), first) - series.seconds.begin();
+  const auto end = std::upper_bound(series.seconds.begin(), series.seconds.end(), last) - series.seconds.begin();
+  const auto cut = [begin, end](const auto& values) {
+    using Values = std::decay_t<decltype(values)>;
+    return end > begin ? Values(values.begin() + begin, values.begin() + end) : Values{};
+  };
+  return {series.measure, cut(series.seconds), cut(series.observed), cut(series.initial), cut(series.best)};
+}
+
+void addValidation(const RunConfig& config, std::span<const ResultRow> rows, const ResultRow* best, ReportData& data) {
+  if (config.validationPeriods.empty()) return;
+  data.periods.push_back(reportedPeriod("Calibration", config.period.start, config.period.end, false));
+  for (const ValidationPeriod& period : config.validationPeriods) {
+    data.periods.push_back(reportedPeriod(period.name, period.start, period.end, true));
+  }
+  if (best != nullptr) {
+    std::vector<JudgedEvaluation> evaluations;
+    for (const ResultRow& row : rows) {
+      if (row.ok) evaluations.push_back({row.number, row.aggregate, row.parameters, row.measures, row.validation});
+    }
+    data.validation = validationTable(config.measures, config.validationPeriods, evaluations, best->number);
+  }
+  data.wholeSeries = data.series.series;
+  for (ShownSeries& series : data.series.series) series = partOf(series, data.periodFirst, data.periodLast);
+}
+
+}  // namespace mirevo
