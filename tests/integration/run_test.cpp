@@ -209,5 +209,20 @@ TEST(FailedRuns, OfTwoSetupsInAFolderAtOnceEachAreDescribed) {
   EXPECT_FALSE(folder.exists("calSimErr._lock_"));
 }
 
+TEST(Scenarios, HaveNamesAndTheirSeriesInTheReport) {
+  const ModelFolder folder;
+  folder.writeSetup({.option = 0, .scenarios = scenarios(3)});
+  folder.editSetup("[SCENARIO_2]\n", "[SCENARIO_2]\n Name = 'dry'\n");
+  folder.editSetup("Name = 'flow'\n", "Name = 'flow'\n Unit = 'm3/s'\n Display_Name = 'Discharge'\n");
+  EXPECT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0);
+  EXPECT_THAT(folder.read("basin.dat"), HasSubstr("# Scenario 2: dry\n"));
+  const std::string report = folder.read("basin_Report.html");
+  EXPECT_THAT(report, HasSubstr(R"("runNames":["","dry",""])"));
+  EXPECT_THAT(report, HasSubstr(R"("quantity":"Discharge","unit":"m3/s")"));
+  for (int number = 1; number <= 3; ++number) {
+    EXPECT_THAT(report, HasSubstr(fmt::format(R"({{"number":{},"count":)", number)));
+  }
+}
+
 }  // namespace
 }  // namespace mirevo::testing

@@ -40,6 +40,23 @@ export function lineOf(times: readonly number[], values: readonly Maybe[], break
   return line;
 }
 
+/** `make` when it is first asked for: most charts of a long report are not drawn at once. */
+export function later<T>(make: () => T): () => T {
+  let made: { value: T } | null = null;
+  return () => (made ??= { value: make() }).value;
+}
+
+/** Time and value in turn, as the charting library takes least memory for; NaN where the line is interrupted. */
+export function pointsOf({ times, values }: Line, log: boolean): Float64Array {
+  const points = new Float64Array(2 * times.length);
+  times.forEach((time, at) => {
+    const value = values[at];
+    points[2 * at] = time;
+    points[2 * at + 1] = value == null || (log && value <= 0) ? NaN : value;
+  });
+  return points;
+}
+
 /** The place of the time that is nearest to `time`. */
 export function nearest(times: readonly number[], time: number): number {
   let [low, high] = [0, times.length - 1];

@@ -192,15 +192,19 @@ test('of many charts those in view are drawn, the others when they come into vie
 test('observations between the steps of a model, scenarios, axes and further measures', async () => {
   const data = sample.hourlyScenarios();
   await withReport(data, {}, async (page) => {
-    const drawn = (index) => page.evaluate((at) => window.drawnOptions(document.querySelectorAll('#series figure')[at]), index);
+    const drawn = (index) => page.evaluate((at) => {
+      const options = window.drawnOptions(document.querySelectorAll('#series figure')[at]);
+      return { ...options, series: options.series.map(({ name, data }) => ({ name, data: [...data] })) };
+    }, index);
     const scenarios = await drawn(0);
     assert.ok(scenarios.series.length > 20);
     assert.equal(scenarios.series[1].name, 'dry year (2)');
     const { series, yAxis } = await drawn(1);
     assert.equal(yAxis[0].name, 'Discharge [m3/s]');
     const [line, dots] = series.filter(({ name }) => name === 'observed');
-    assert.deepEqual(line.data.map(([, value]) => value === null).slice(0, 5), [false, false, false, true, false], 'interrupted once');
-    assert.equal(dots.data.length, line.data.length - 1);
+    const values = line.data.filter((_, at) => at % 2 === 1);
+    assert.deepEqual(values.map(Number.isNaN).slice(0, 5), [false, false, false, true, false], 'interrupted once');
+    assert.equal(dots.data.length, values.length - 1);
     assert.match(await page.locator('.findings details').textContent(), /2 more series: .*gauge 5.*gauge 6/);
     const ranking = await page.locator('[aria-label="Best evaluations"] tbody th').allTextContents();
     assert.equal(ranking.filter((text) => [String(data.best.number), '30'].includes(text)).length, 1, `a set is listed once: ${ranking}`);

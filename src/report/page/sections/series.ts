@@ -4,7 +4,7 @@ import { timesOf, type Figures, type Maybe, type ReportData, type Series } from 
 import { shorten, table } from '../dom';
 import { count, moment, number } from '../format';
 import type { Look } from '../look';
-import { lineOf, nearest, type Line } from '../lines';
+import { later, lineOf, nearest, pointsOf, type Line } from '../lines';
 import { durationCurve, finite, spaced, thin } from '../numbers';
 import { logRange } from '../ticks';
 import { withSeriesAbove } from './above';
@@ -59,10 +59,10 @@ function outsidePeriod(look: Look, times: number[], period: Series['period']): o
 }
 
 /** A line and the dots on it; both have one entry in the legend. */
-function drawnLine(name: string, { times, values, dots }: Line, log: boolean, color: string, more: object): object[] {
-  const scaled = onLog(values, log);
+function drawnLine(name: string, line: Line, log: boolean, color: string, more: object): object[] {
+  const { dots } = line;
   return [
-    { name, type: 'line', symbol: 'none', sampling: 'lttb', connectNulls: false, color, data: times.map((time, at) => [time, scaled[at]]), ...more },
+    { name, type: 'line', symbol: 'none', sampling: 'lttb', connectNulls: false, color, data: pointsOf(line, log), ...more },
     ...(dots.length > 0 ? [{ name, type: 'scatter', symbolSize: 5, itemStyle: { color }, large: dots.length > 3000, ...more,
       data: dots.filter(([, value]) => !log || value > 0) }] : []),
   ];
@@ -85,9 +85,11 @@ function hydrographPlan(data: ReportData, series: Series): ChartPlan {
   const step = times.slice(1, 1000).reduce((least, time, at) => Math.min(least, time - times[at]!), 86400000);
   const breaks = series.breaks ?? {};
   const isPoints = series.observedAsPoints ?? false;
-  const observed = lineOf(times, series.observed, breaks.observed, isPoints, true);
-  const lines = simulated.map((one) => ({ ...one, line: lineOf(times, one.values, breaks[one.key]) }));
-  const apart = residuals ? lineOf(times, residuals, [...breaks.observed ?? [], ...breaks[judged!.key] ?? []].sort((a, b) => a - b), isPoints) : null;
+  const linesLater = later(() => ({
+    observed: lineOf(times, series.observed, breaks.observed, isPoints, true),
+    lines: simulated.map((one) => ({ ...one, line: lineOf(times, one.values, breaks[one.key]) })),
+    apart: residuals ? lineOf(times, residuals, [...breaks.observed ?? [], ...breaks[judged!.key] ?? []].sort((a, b) => a - b), isPoints) : null,
+  }));
   const all = [series.observed, ...simulated.map(({ values }) => values)];
   return {
     title: 'Simulated and observed, and the residuals',
@@ -98,6 +100,7 @@ function hydrographPlan(data: ReportData, series: Series): ChartPlan {
     spans: spansOf(series),
     switches: [{ key: 'log', label: 'Log' }],
     option: (look, is) => {
+      const { observed, lines, apart } = linesLater();
       const style = lineStyles(look);
       const ends = { type: 'time', min: times[0], max: times[times.length - 1] };
       const below = { xAxisIndex: 1, yAxisIndex: 1 };
@@ -155,7 +158,7 @@ function scenarioPlan(data: ReportData, series: Series): ChartPlan {
   const observed = lineOf(times, series.observed, series.breaks?.observed, isPoints, true);
   const runs = (series.scenarios ?? []).map((one) => {
     const own = timesOf(one, one.values.length);
-    return { name: scenarioName(data, one.number), times: own, values: one.values, line: lineOf(own, one.values, one.breaks) };
+    return { name: scenarioName(data, one.number), times: own, values: one.values, line: later(() => lineOf(own, one.values, one.breaks)) };
   });
   const all = [series.observed, ...runs.map(({ values }) => values)];
   const step = [times, ...runs.map((run) => run.times)].flatMap((own) => own.slice(1, 1000).map((time, at) => time - own[at]!)).reduce((a, b) => Math.min(a, b), 86400000);
@@ -186,7 +189,7 @@ function scenarioPlan(data: ReportData, series: Series): ChartPlan {
         },
       }),
       series: [
-        ...runs.flatMap(({ name, line }, index) => drawnLine(name, line, is('log'), look.many[index % look.many.length]!, {
+        ...runs.flatMap(({ name, line }, index) => drawnLine(name, line(), is('log'), look.many[index % look.many.length]!, {
           lineStyle: { color: look.many[index % look.many.length], width: 1.6, type: (['solid', 'dashed', 'dotted'] as const)[Math.floor(index / look.many.length) % 3] },
         })),
         ...drawnLine('observed', isPoints ? { ...observed, times: [], values: [] } : observed, is('log'), look.observed,
