@@ -139,8 +139,7 @@ std::vector<PeriodSeries> OutputReader::readShownObservations() {
   }
   std::vector<PeriodSeries> observations;
   for (const std::size_t i : shownMeasures_) {
-    observations.push_back(
-        readPeriodObservations(series_.observation(i), description_.measures[i], shownPeriod_));
+    observations.push_back(readPeriodObservations(series_.observation(i), description_.measures[i], shownPeriod_));
     keepCounted(observations.back(), description_.measures[i], description_.period, judgedPeriods);
   }
   return observations;

@@ -48,11 +48,13 @@ void addTimes(std::span<const std::int64_t> steps, ObservedSeries& observed) {
   const std::int64_t origin = secondNumber(observed.start);
   std::vector<double> days;
   std::vector<double> values;
+  std::vector<double> weights;
   std::int64_t last = std::numeric_limits<std::int64_t>::min();
   std::size_t next = 0;  // observation
   const auto addObservation = [&] {
     days.push_back(observed.days[next]);
     values.push_back(observed.values[next]);
+    if (!observed.weights.empty()) weights.push_back(observed.weights[next]);
     last = secondAfter(origin, observed.days[next++]);
   };
   for (const std::int64_t step : steps) {
@@ -60,11 +62,13 @@ void addTimes(std::span<const std::int64_t> steps, ObservedSeries& observed) {
     if (step <= last) continue;
     days.push_back(static_cast<double>(step - origin) / kSecondsPerDay);
     values.push_back(std::numeric_limits<double>::quiet_NaN());
+    if (!observed.weights.empty()) weights.push_back(0.0);
     last = step;
   }
   while (next < observed.days.size()) addObservation();
   observed.days = std::move(days);
   observed.values = std::move(values);
+  observed.weights = std::move(weights);
 }
 
 }  // namespace
@@ -73,7 +77,9 @@ void addSimulatedSteps(const KeptSteps& kept, std::span<const OutputMeasure> mea
                        std::span<ObservedSeries> observed) {
   std::map<std::string, std::vector<std::int64_t>> steps;  // by file
   for (ObservedSeries& series : observed) {
-    const SeriesReference& simulation = measures[series.measure].simulation;
+    const OutputMeasure& measure = measures[series.measure];
+    if (!measure.timeMatch.isUsual()) continue;  // its times are those of the observations
+    const SeriesReference& simulation = measure.simulation;
     std::vector<std::int64_t>& ofFile = steps[simulation.fileName];
     if (ofFile.empty()) ofFile = readSteps(simulation, period.start, kept.end.value_or(period.end));
     addTimes(ofFile, series);

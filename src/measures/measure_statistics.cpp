@@ -113,8 +113,8 @@ std::string describeLackOf(const MeasureStatistics& statistics, const SeriesItem
 }
 
 /// Calls `use(time, observed, weight, simulated)` for every observation that counts for the measure and is not missing,
-/// in order, with its time in days on the simulation's axis and its simulated value, if there is one; stops when that is
-/// false.
+/// in order, with its time in days on the simulation's axis and its simulated value, if there is one; stops when that
+/// is false.
 template <typename Use>
 void forEachObservation(const OutputMeasure& measure, const SeriesItem& simulation, const SeriesItem& observation,
                         const EvaluationPeriod& period, const Use& use) {

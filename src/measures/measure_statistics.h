@@ -50,10 +50,10 @@ void requireItem(TimeSeriesObject& series, const SeriesReference& reference);
 
 /// Statistics of the weighted differences simulated minus observed: `weight` times a difference that is not positive,
 /// `weightAbove` times one that is, times the weight of the observation. The period includes both ends. Missing
-/// observations, those that the measure leaves out, those of weight 0, and those without a simulated value do not count.
-/// The peak and low differences are computed only if `wantPeaks`: from the pairs, if observations are left out inside
-/// the period or are not compared with the simulated value at their time. The two files may start at different times;
-/// equal times always match. Throws FatalError with the fixed texts.
+/// observations, those that the measure leaves out, those of weight 0, and those without a simulated value do not
+/// count. The peak and low differences are computed only if `wantPeaks`: from the pairs, if observations are left out
+/// inside the period or are not compared with the simulated value at their time. The two files may start at different
+/// times; equal times always match. Throws FatalError with the fixed texts.
 MeasureStatistics computeMeasureStatistics(const OutputMeasure& measure, const EvaluationPeriod& period,
                                            TimeSeriesObject& simulation, TimeSeriesObject& observation, double weight,
                                            double weightAbove, bool wantPeaks,

@@ -7,8 +7,8 @@
 
 #include "common/date_record.h"
 #include "common/settings/code_name.h"
-#include "measures/observation_weights.h"
 #include "measures/observation_selection.h"
+#include "measures/observation_weights.h"
 #include "measures/time_match.h"
 #include "platform/series/time_series_object.h"
 
@@ -68,8 +68,8 @@ struct OutputMeasure {
   ObservationSelection selection = {};
   TimeMatching timeMatch = {};
   SeriesReference shownAbove = {};  ///< drawn above the hydrograph; without a file name: none
-  std::string displayName = {};  ///< of the quantity, for people; empty: the name of the observed item
-  std::string unit = {};         ///< of the values; empty: as the observed file says
+  std::string displayName = {};     ///< of the quantity, for people; empty: the name of the observed item
+  std::string unit = {};            ///< of the values; empty: as the observed file says
 };
 
 /// Values of series in 32 bits, as the statistics of a run use them, or with all digits of their file.

@@ -78,7 +78,10 @@ std::uintmax_t sizeOf(const std::string& path) {
 }
 
 std::string itemText(const TimeSeriesObject& series, const SeriesReference& reference) {
-  return fmt::format("item No. {} ({})", reference.itemNo, series.itemName(reference.itemNo));
+  const std::string name = series.itemName(reference.itemNo);
+  const std::string unit = series.itemUnit(reference.itemNo);
+  const bool isInName = unit.empty() || name.find(unit) != std::string::npos;
+  return fmt::format("item No. {} ({}{})", reference.itemNo, name, isInName ? "" : fmt::format(" [{}]", unit));
 }
 
 std::string spanText(const TimeSeriesObject& series) {

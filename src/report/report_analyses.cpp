@@ -25,6 +25,7 @@
 #include "parameters/parameter_model.h"
 #include "parameters/read_template.h"
 #include "platform/series/time_series_object.h"
+#include "report/series_labels.h"
 
 namespace mirevo {
 namespace {
@@ -150,13 +151,17 @@ std::string pairName(std::span<const OutputMeasure> measures, std::size_t measur
 std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::string& filePrefix, const RunRecord& record,
                                         std::vector<std::string>& faults) {
   std::vector<ReportedBand> bands;
-  for (const std::size_t i : measuresOfDistinctPairs(config.measures)) {
+  const std::vector<std::size_t> shown = measuresOfDistinctPairs(config.measures);
+  const std::vector<SeriesLabel> labels = seriesLabels(config.measures, shown);
+  for (std::size_t k = 0; k < shown.size(); ++k) {
+    const std::size_t i = shown[k];
     const std::string path = runFilePath(filePrefix, run_files::kBand, static_cast<int>(i) + 1);
     std::string fault;
     auto band = readBand(path, record.linesOf(fileNameOf(path)), fault);
     if (!fault.empty()) faults.push_back(fault);
     if (!band) continue;
     band->measure = pairName(config.measures, i);
+    band->label = labels[k];
     bands.push_back(std::move(*band));
   }
   return bands;

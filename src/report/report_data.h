@@ -94,6 +94,7 @@ struct ReportedEvaluations {
 /// The 5 to 95 % band of an uncertainty analysis, one entry per time.
 struct ReportedBand {
   std::string measure;
+  SeriesLabel label;
   std::vector<std::int64_t> seconds;
   std::vector<float> observed;  ///< NaN where there is none
   std::vector<float> lower;
@@ -164,9 +165,9 @@ struct ReportData {
   std::int64_t periodLast = 0;
   SeriesTable series;
   std::vector<std::optional<SeriesAbove>> above;  ///< one per shown series, or none at all
-  std::vector<SeriesLabel> seriesLabels;  ///< one per series
+  std::vector<SeriesLabel> seriesLabels;          ///< one per series
   std::vector<ScenarioSeries> scenarioSeries;
-  std::vector<std::string> runNames;  ///< of the evaluations, from the first on; empty where one has none
+  std::vector<std::string> runNames;    ///< of the evaluations, from the first on; empty where one has none
   std::vector<ReportedPeriod> periods;  ///< the evaluation period, and those of validation; empty without any of these
   ValidationTable validation;
   std::vector<ShownSeries> wholeSeries;  ///< `series` from the first to the last period; empty without `periods`

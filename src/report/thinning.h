@@ -19,8 +19,8 @@ inline constexpr std::size_t kMostDrawnTimes = 100'000;
 std::size_t mostDrawnTimes(std::size_t count);
 
 /// The series at the times at which one of its columns has its smallest or largest value within a short span, and at
-/// the ends of gaps, at most `most` of them: drawn, it looks like the whole series, peaks and gaps included. Of a column
-/// with few values all are there.
+/// the ends of gaps, at most `most` of them: drawn, it looks like the whole series, peaks and gaps included. Of a
+/// column with few values all are there.
 ShownSeries thinned(const ShownSeries& series, std::size_t most = kMostDrawnTimes);
 /// The same for a band; its counts stay those of all times.
 ReportedBand thinned(const ReportedBand& band, std::size_t most = kMostDrawnTimes);

@@ -65,8 +65,9 @@ std::unique_ptr<ScenarioSeriesFile> openScenarioSeries(const RunConfig& config, 
   settings.headLines = {columnName(config.title), fmt::format("Mirevo {}", programVersion()),
                         "Setup file: " + config.setupFile};
   settings.measures = seriesNames(config.measures, output.shownMeasures());
-  settings.periodFirst = secondNumber(config.period.start);
-  settings.periodLast = secondNumber(config.period.end);
+  const EvaluationPeriod period = hullOf(config.period, config.validationPeriods);
+  settings.periodFirst = secondNumber(period.start);
+  settings.periodLast = secondNumber(period.end);
   settings.mostRuns = config.task->shownRuns();
   auto file =
       std::make_unique<ScenarioSeriesFile>(std::move(settings), [&log](std::string_view text) { log.warning(text); });

@@ -165,6 +165,7 @@ export interface Series extends Times {
 
 export interface Band extends Times {
   measure: string;
+  quantity?: string | null;
   unit?: string | null;
   observed: Maybe[];
   p5: Maybe[];

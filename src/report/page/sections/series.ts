@@ -35,7 +35,7 @@ function simulations(data: ReportData, series: Series): Simulated[] {
 }
 
 /** What an axis says of the values: "Discharge [m3/s]". */
-const labelOf = ({ quantity, unit }: Series) => [shorten(quantity ?? '', 60), unit ? `[${shorten(unit, 20)}]` : ''].filter(Boolean).join(' ') || 'Value';
+export const labelOf = ({ quantity, unit }: { quantity?: string | null; unit?: string | null }) => [shorten(quantity ?? '', 60), unit ? `[${shorten(unit, 20)}]` : ''].filter(Boolean).join(' ') || 'Value';
 const onLog = (values: Maybe[], log: boolean) => (log ? values.map((value) => (value !== null && value > 0 ? value : null)) : values);
 const lineStyles = (look: Look) => ({
   initial: { color: look.initial, width: 1.2, type: 'dashed' as const },
@@ -336,7 +336,7 @@ export function seriesSection(data: ReportData): Section | null {
       chart(withSeriesAbove(hydrographPlan(data, series), series)),
       ...(judgedPlaces(series).length > 0 && simulations(data, series).length > 0
         ? [grid(chart(scatterPlan(data, series)), chart(durationPlan(data, series)))] : []),
-      ...viewsOf(series, unitOf(series)),
+      ...viewsOf(series, labelOf(series)),
     ]),
   };
 }

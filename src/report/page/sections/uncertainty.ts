@@ -5,6 +5,7 @@ import { count, moment, number, percent } from '../format';
 import { finite, histogram, spaced, type Bin } from '../numbers';
 import { judgements } from './search';
 import { grid, heading, paragraph, type Section } from './section';
+import { labelOf } from './series';
 
 const kBandPoints = 1500; // across the chart: more than it has pixels
 const kFewValues = 150; // observed values up to which each has a dot
@@ -137,7 +138,7 @@ function bandPlan(band: Band): ChartPlan {
         legend: legend(look, { data: ['5 to 95 %', ...lineEntries(['median', 'observed'])], itemWidth: 34 }),
         grid: { left: 72, right: 16, top: 36, bottom: 72 },
         xAxis: [axis(look, { type: 'time', min: first, max: last })],
-        yAxis: axis(look, { name: band.unit || 'Value', log: is('log'), nameGap: 48, ...(is('log') ? {} : { scale: false }) }),
+        yAxis: axis(look, { name: labelOf(band), log: is('log'), nameGap: 48, ...(is('log') ? {} : { scale: false }) }),
         dataZoom: timeZoom(look, [0], 'none', (time) => moment(time, step)),
         tooltip: tooltip(look, { trigger: 'axis', formatter: (found: { axisValue: number }[]) => {
           const place = nearest(times, found[0]!.axisValue);
