@@ -42,8 +42,8 @@ TEST(Report, StandsBesideTheResultsHoweverARunEnds) {
        {R"("task":"sensitivity")", R"("derivatives":[[)", R"("covariance":{"names":["a","b"],"estimate":[4,1])"}},
       {{.option = 3, .maxEvaluations = 20},
        0,
-       {R"("band":[{"measure":"flow","count":365,"start":"2001-01-01T00:00:00","step":86400000,"observed":[5,)",
-        R"("initialLabel":"first evaluation")"}},
+       {R"("band":[{"measure":"flow","quantity":"simulated","unit":null,"count":365,"start":"2001-01-01T00:00:00")",
+        R"("step":86400000,"observed":[5,)", R"("initialLabel":"first evaluation")"}},
   };
   for (const auto& [settings, exitCode, parts] : cases) {
     const ModelFolder folder;

@@ -31,7 +31,7 @@ const blankCharts = (page) => page.$$eval('figure', (figures) => figures.filter(
 const sectionsOf = (page) => page.$$eval('main > section', (found) => found.map(({ id }) => id));
 const zoomOf = (page, figure) => page.evaluate((element) => window.drawnOptions(element).dataZoom.map(({ start, end }) => [start, end])[0], figure);
 
-const kOptimisation = ['series', 'parameters', 'results', 'progress', 'histories', 'dotty', 'good-sets', 'failures', 'run', 'summary'];
+const kOptimisation = ['series', 'parameters', 'results', 'compared', 'progress', 'histories', 'dotty', 'good-sets', 'failures', 'run', 'summary'];
 /** Names are text wherever they stand, tables that open later and tooltips included. */
 async function checkHostile(page) {
   const shown = await page.evaluate(() => document.getElementById('report').textContent);
@@ -49,9 +49,9 @@ const cases = {
   'a search': [sample.dataOf('optimisation'), 3 + 2 + 2 + 2 + 2, kOptimisation],
   'a search by few evaluations with two series': [sample.twoSeries(), 6 + 1 + 2 + 2 + 2,
     kOptimisation.filter((id) => id !== 'failures')],
-  'an uncertainty analysis': [sample.dataOf('uncertainty'), 1 + 3 + 1 + 5 + 2, ['band', 'series', 'parameters', 'results', 'progress', 'distributions', 'dotty', 'failures', 'run', 'summary']],
-  'a sensitivity analysis': [sample.dataOf('sensitivity'), 4 + 3, ['sensitivity', 'series', 'parameters', 'results', 'run', 'summary']],
-  'scenario runs': [sample.dataOf('scenarios'), 4 + 1 + 2, ['series', 'parameters', 'results', 'progress', 'dotty', 'run', 'summary']],
+  'an uncertainty analysis': [sample.dataOf('uncertainty'), 1 + 3 + 1 + 5 + 2, ['band', 'series', 'parameters', 'results', 'compared', 'progress', 'distributions', 'dotty', 'failures', 'run', 'summary']],
+  'a sensitivity analysis': [sample.dataOf('sensitivity'), 4 + 3, ['sensitivity', 'series', 'parameters', 'results', 'compared', 'run', 'summary']],
+  'scenario runs': [sample.dataOf('scenarios'), 4 + 1 + 2, ['series', 'parameters', 'results', 'compared', 'progress', 'dotty', 'run', 'summary']],
   'a run without an evaluation': [sample.empty(), 0, ['run']],
   'a run whose evaluations all failed': [sample.dataOf('allFailed'), 0, ['parameters', 'results', 'failures', 'run', 'summary']],
   'a search with hostile names': [sample.hostile(sample.dataOf('optimisation')), 3 + 2 + 2 + 2 + 2, kOptimisation, true],
