@@ -123,7 +123,7 @@ void ScenarioSeriesFile::add(int number, const std::vector<PeriodSeries>& series
   written_.push_back(number);
 }
 
-void ScenarioSeriesFile::append(std::string_view text) {
+void ScenarioSeriesFile::append(const std::string& text) {
   errno = 0;
   std::ofstream file(settings_.path, std::ios::binary | std::ios::app);
   file.write(text.data(), static_cast<std::streamsize>(text.size()));

@@ -42,7 +42,7 @@ class ScenarioSeriesFile final {
   void add(int number, const std::vector<PeriodSeries>& series);
 
  private:
-  void append(std::string_view text);
+  void append(const std::string& text);
 
   Settings settings_;
   std::function<void(std::string_view)> warn_;
