@@ -29,9 +29,9 @@ std::vector<KeywordRow> seriesKeywords(SeriesOf, std::string_view fileMeaning) {
 
 /// Which other item of the observation file is meant: `itemOf(weighting)`.
 template <class ItemOf>
-KeywordRow weightingItem(ItemOf, std::string_view name, std::string_view meaning) {
+KeywordRow weightingItem(ItemOf, std::string_view keyword, std::string_view meaning) {
   return setting<OutputMeasure>([](auto& m) -> auto& { return ItemOf{}(m.weighting); },
-                                {.name = name,
+                                {.name = keyword,
                                  .defaultValue = kNoDefault,
                                  .range = from(1),
                                  .refusal = "Error: Item number invalid for output measure ",
