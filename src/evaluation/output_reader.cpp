@@ -95,9 +95,15 @@ void OutputReader::prepareValidation() {
     made.measure.selection.start.reset();  // its own period is one of calibration
     made.measure.selection.end.reset();
     if (!description_.isForRuns) continue;
-    const ObservedSeries observed =
-        readObservedSeries(i, made.measure, made.period, SeriesPrecision::single, series_.observation(i));
-    if (!observed.values.empty()) continue;
+    try {
+      const ObservedSeries observed =
+          readObservedSeries(i, made.measure, made.period, SeriesPrecision::single, series_.observation(i));
+      if (!observed.values.empty()) continue;
+    } catch (const FatalError& error) {  // such as a weight that cannot be one
+      warnings_.push_back(fmt::format("{}\nThe measure has no value in the validation period {}",
+                                      error.message() + "\n" + error.detail(), quotedForMessage(period.name)));
+      continue;
+    }
     warnings_.push_back(
         fmt::format("output measure {} has no observation in the validation period {}, and so no value there",
                     quotedForMessage(made.measure.name), quotedForMessage(period.name)));

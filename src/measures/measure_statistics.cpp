@@ -165,9 +165,12 @@ MeasureStatistics collectPairs(const OutputMeasure& measure, const SeriesItem& s
   if (statistics.simulatedValues.empty()) {
     fatalError(withNumber("Error: No simulated data found at observation times for item No. % in ", simulation.item) +
                    simulation.fileName,
-               fmt::format("{}the evaluation period is {} to {}\n{}\n{}", describeLackOf(statistics, observation),
+               fmt::format("{}the evaluation period is {} to {}\n{}\n{}{}", describeLackOf(statistics, observation),
                            formatDate(period.start), formatDate(period.end), describeSpan(simulation),
-                           describeSpan(observation)));
+                           describeSpan(observation),
+                           measure.timeMatch.isUsual()
+                               ? ""
+                               : "\nobservations are compared with " + describeMatching(measure.timeMatch)));
   }
   // Of all observations, so that it is the same for every model run.
   statistics.epsilon = kShareOfMean * std::abs(sumOfObserved / static_cast<double>(statistics.observationCount));

@@ -119,6 +119,7 @@ std::string describeSelected(const OutputMeasure& measure, const EvaluationPerio
                              TimeSeriesObject& observation) {
   OutputMeasure tried = measure;
   tried.selection = {};
+  tried.weighting = {};
   EvaluationPeriod counted = period;
   counted.warmUpDays = 0.0;
   const auto count = [&] {
@@ -135,6 +136,10 @@ std::string describeSelected(const OutputMeasure& measure, const EvaluationPerio
   for (const ObservationSelection& setting : settingsOf(measure.selection)) {
     add(tried.selection, setting);
     addCount(describeSelection(setting));
+  }
+  if (measure.weighting.isUsed()) {
+    tried.weighting = measure.weighting;
+    addCount("the weights and quality codes");
   }
   return text;
 }

@@ -17,6 +17,7 @@
 #include "common/text.h"
 #include "measures/dates.h"
 #include "measures/measure_statistics.h"
+#include "measures/observation_selection.h"
 #include "measures/output_measure.h"
 #include "platform/series/time_series_object.h"
 
@@ -25,10 +26,13 @@ namespace {
 
 constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
 
-/// In 32 bits, as a file may hold them: 1.1 is 1.1 in each.
+/// Also in 32 bits, as a file may hold them: 1.1 is 1.1 in each.
 bool contains(std::span<const double> codes, double code) {
-  return std::ranges::any_of(codes,
-                             [code](double listed) { return static_cast<float>(listed) == static_cast<float>(code); });
+  constexpr double kLargestExact = 16777216.0;  // of the whole numbers in 32 bits
+  return std::ranges::any_of(codes, [code](double listed) {
+    const bool isAsFloat = static_cast<float>(listed) == static_cast<float>(code);
+    return listed == code || (isAsFloat && std::abs(listed) < kLargestExact);
+  });
 }
 
 /// The values of another item of the file, NaN where one is missing; empty for item 0.
@@ -39,10 +43,15 @@ std::span<const double> itemValues(TimeSeriesObject& observation, const OutputMe
   return observation.exactValues(item);
 }
 
+/// Beyond these the square of a weighted difference may leave the range of 32 bits.
+constexpr double kSmallest = 1e-12;
+constexpr double kLargest = 1e12;
+
 double weightOf(const ObservationWeighting& weighting, double value) {
-  if (weighting.errorItem != 0) return value > 0.0 ? 1.0 / value : kNaN;
-  if (std::isnan(value)) return 0.0;
-  return value >= 0.0 ? value : kNaN;
+  const bool isUsable = value >= kSmallest && value <= kLargest;
+  if (weighting.errorItem != 0) return isUsable ? 1.0 / value : kNaN;
+  if (std::isnan(value) || value == 0.0) return 0.0;
+  return isUsable ? value : kNaN;
 }
 
 /// Whether the observed item has a value, per step.
@@ -68,6 +77,19 @@ void forEachStepIn(const EvaluationPeriod& period, const TimeSeriesObject& obser
   }
 }
 
+/// Calls `use(step)` for each step in the period whose observation the measure's selection does not leave out.
+template <class Use>
+void forEachCounted(TimeSeriesObject& observation, const OutputMeasure& measure, const EvaluationPeriod& period,
+                    const Use& use) {
+  const std::optional<DateRecord> start = observation.startTime();
+  if (!start) return;
+  const ObservationFilter filter(measure.selection, *start);
+  const std::span<const float> values = observation.values(measure.observation.itemNo);
+  forEachStepIn(countedPeriod(measure, period), observation, [&](std::size_t step) {
+    if (filter.counts(observation.times()[step], values[step])) use(step);
+  });
+}
+
 std::string nameOf(const TimeSeriesObject& observation, std::int32_t item) {
   return fmt::format("item No. {} ({})", item, observation.itemName(item));
 }
@@ -78,13 +100,15 @@ std::string nameOf(const TimeSeriesObject& observation, std::int32_t item) {
   const std::int32_t item = isError ? weighting.errorItem : weighting.weightItem;
   const double value = observation.exactValues(item)[step];
   const std::int64_t second = secondAfter(secondNumber(observation.startTime().value()), observation.times()[step]);
-  fatalError("Error: Invalid weight of an observation for output measure " + measure.name,
-             fmt::format("{}{}: {} is {} at {}, where the observation counts\n{}", weighting.weightLocation,
-                         trimTrailing(measure.observation.fileName), nameOf(observation, item),
-                         std::isnan(value) ? "missing" : formatReal(value), formatDate(dateOfSecond(second)),
-                         isError ? "expected a standard error greater than 0; leave out observations without one by a "
-                                   "quality code, or mark them as missing"
-                                 : "expected a weight of 0 or more; 0, or a missing one, leaves the observation out"));
+  fatalError(
+      "Error: Invalid weight of an observation for output measure " + measure.name,
+      fmt::format("{}{}: {} is {} at {}, where the observation counts\n{}", weighting.weightLocation,
+                  trimTrailing(measure.observation.fileName), nameOf(observation, item),
+                  std::isnan(value) ? "missing" : formatReal(value), formatDate(dateOfSecond(second)),
+                  isError
+                      ? "expected a standard error from 1e-12 to 1e12; leave out observations without one by a "
+                        "quality code, or mark them as missing"
+                      : "expected a weight from 1e-12 to 1e12, or 0; 0, or a missing one, leaves the observation out"));
 }
 
 /// "no observation in the evaluation period has a code of Quality_Left_Out (5); there are 0 (360 times), 1 (5)"
@@ -144,7 +168,7 @@ std::vector<double> observationWeights(TimeSeriesObject& observation, const Outp
                                        const EvaluationPeriod& period) {
   std::vector<double> weights = stepWeights(observation, measure);
   if (weights.empty()) return weights;
-  forEachStepIn(period, observation, [&](std::size_t step) {
+  forEachCounted(observation, measure, period, [&](std::size_t step) {
     if (std::isnan(weights[step])) refuseWeight(observation, measure, step);
   });
   return weights;
@@ -159,7 +183,7 @@ std::vector<std::string> doubtsOfCodes(TimeSeriesObject& observation, const Outp
   const std::span<const double> codes =
       itemValues(observation, measure, weighting.qualityItem, weighting.qualityLocation);
   std::map<double, std::size_t> counts;
-  forEachStepIn(period, observation, [&](std::size_t step) {
+  forEachCounted(observation, measure, period, [&](std::size_t step) {
     if (observed[step] && !std::isnan(codes[step])) ++counts[codes[step]];
   });
   for (const std::string& doubt : {doubtOfList("Quality_Left_Out", weighting.leftOut, counts),
@@ -177,7 +201,7 @@ void requireCounting(TimeSeriesObject& observation, const OutputMeasure& measure
   const std::vector<bool> observed = observedSteps(observation, measure);
   std::size_t count = 0;
   bool anyCounts = false;
-  forEachStepIn(period, observation, [&](std::size_t step) {
+  forEachCounted(observation, measure, period, [&](std::size_t step) {
     count += observed[step] ? 1 : 0;
     anyCounts = anyCounts || weights[step] != 0.0;
   });
@@ -193,10 +217,11 @@ void requireCounting(TimeSeriesObject& observation, const OutputMeasure& measure
   }
   fatalError("Error: No observation counts for output measure " + measure.name,
              fmt::format("{}{}: each of {} of item No. {} ({}) in the evaluation period has {}\n"
-                         "take codes out of the list, or compare another item or period",
+                         "{}compare another item or period",
                          weighting.leftOut.empty() ? weighting.weightLocation : weighting.qualityLocation,
                          trimTrailing(measure.observation.fileName), countText(count, "value"),
-                         measure.observation.itemNo, observation.itemName(measure.observation.itemNo), causes));
+                         measure.observation.itemNo, observation.itemName(measure.observation.itemNo), causes,
+                         weighting.leftOut.empty() ? "" : "take codes out of the list, or "));
 }
 
 std::string describeWeighting(const ObservationWeighting& weighting) {

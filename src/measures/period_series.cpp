@@ -78,11 +78,12 @@ bool isSameItems(const OutputMeasure& a, const OutputMeasure& b) {
   const auto isSame = [](const SeriesReference& left, const SeriesReference& right) {
     return left.fileName == right.fileName && left.itemNo == right.itemNo;
   };
-  return isSame(a.simulation, b.simulation) && isSame(a.observation, b.observation) && a.timeMatch == b.timeMatch;
+  return isSame(a.simulation, b.simulation) && isSame(a.observation, b.observation);
 }
 
 bool isSamePair(const OutputMeasure& a, const OutputMeasure& b) {
-  return isSameItems(a, b) && a.selection.isSameAs(b.selection) && a.weighting == b.weighting;
+  return isSameItems(a, b) && a.timeMatch == b.timeMatch && a.selection.isSameAs(b.selection) &&
+         a.weighting == b.weighting;
 }
 
 std::vector<std::size_t> measuresOfDistinctPairs(std::span<const OutputMeasure> measures) {

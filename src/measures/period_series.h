@@ -34,9 +34,9 @@ PeriodSeries readPeriodObservations(TimeSeriesObject& series, const OutputMeasur
 std::vector<float> valuesAt(const PeriodSeries& series, std::span<const std::int64_t> seconds,
                             double largestGap = kAnyGap);
 
-/// Whether two measures compare the same items of the same files, in the same way.
+/// Whether two measures compare the same items of the same files.
 bool isSameItems(const OutputMeasure& a, const OutputMeasure& b);
-/// Whether they also have the same observations, with the same weights.
+/// Whether they also do so in the same way, with the same observations and weights.
 bool isSamePair(const OutputMeasure& a, const OutputMeasure& b);
 
 /// The measures that compare series, 0-based; of several that compare the same pair only the first.

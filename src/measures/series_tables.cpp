@@ -178,7 +178,8 @@ void SeriesTables::checkItems(std::span<const OutputMeasure> measures, const Eva
       requireObservations(observed, measures[i], period);
       requireDefined(observed, measures[i]);
     }
-    comparedItems_[i].observed = itemText(observation(i), measures[i].observation) + spanText(observation(i));
+    comparedItems_[i].observed = itemText(observation(i), measures[i].observation) + spanText(observation(i)) +
+                                 countedText(observed, measures[i], period);
     warnOfMarkers(observed, measures[i]);
     for (const std::string& doubt : doubtsOfCodes(observation(i), measures[i], period)) {
       addWarning(measures[i].weighting.qualityLocation, doubt);
@@ -192,8 +193,33 @@ void SeriesTables::checkItems(std::span<const OutputMeasure> measures, const Eva
     requireItem(simulation(i), measures[i].simulation);
     comparedItems_[i].simulated = itemText(simulation(i), measures[i].simulation);
     warnOfDefaultItem(simulation(i), measures[i].simulation, simulationNames_[simulationIndex_[i]]);
+    warnOfLongSteps(simulation(i), measures[i]);
     needsPairs_[i] = hasPairs(measures[i], period, simulation(i), observation(i));
   }
+}
+
+std::string SeriesTables::countedText(const ObservedSeries& observed, const OutputMeasure& measure,
+                                      const EvaluationPeriod& period) {
+  if (period.warmUpDays == 0.0 && describeSelection(measure.selection).empty() && !measure.weighting.isUsed())
+    return {};
+  OutputMeasure all = measure;
+  all.selection = {};
+  all.weighting = {};
+  const ObservedSeries whole = readObservedSeries(observed.measure, all, {period.start, period.end},
+                                                  SeriesPrecision::single, observation(observed.measure));
+  return fmt::format(", of which {} of {} observations in the evaluation period count", observed.values.size(),
+                     whole.values.size());
+}
+
+void SeriesTables::warnOfLongSteps(const TimeSeriesObject& simulation, const OutputMeasure& measure) {
+  const std::span<const double> times = simulation.times();
+  if (measure.timeMatch.kind != TimeMatch::mean || times.size() < 2) return;
+  const double step = (times.back() - times.front()) / static_cast<double>(times.size() - 1);
+  if (step <= 1.0 + kSameTimeDays) return;
+  addWarning(measure.simulation.fileLocation,
+             fmt::format("{} has steps of {} days on average: with Time_Match = 'mean' a day is compared with the one "
+                         "step in it, which is no mean",
+                         trimTrailing(measure.simulation.fileName), formatReal(step)));
 }
 
 void SeriesTables::requireObservations(const ObservedSeries& observed, const OutputMeasure& measure,
@@ -221,6 +247,7 @@ void SeriesTables::checkSelection(const ObservedSeries& observed, const OutputMe
   if (isSelected && count < kFew) {
     OutputMeasure all = measure;
     all.selection = {};
+    all.weighting = {};
     const EvaluationPeriod whole{period.start, period.end};
     TimeSeriesObject& series = observation(observed.measure);
     const std::size_t countOfAll =

@@ -74,6 +74,10 @@ class SeriesTables final {
   /// Throws FatalError if the statistic cannot be computed for these observations, whatever the model does; warns if it
   /// cannot be where all of them are compared.
   void requireDefined(const ObservedSeries& observed, const OutputMeasure& measure);
+  /// ", of which 300 of 365 observations in the evaluation period count"; empty if all do, unless they are missing.
+  std::string countedText(const ObservedSeries& observed, const OutputMeasure& measure, const EvaluationPeriod& period);
+  /// Where daily means are to be made of steps that are longer.
+  void warnOfLongSteps(const TimeSeriesObject& simulation, const OutputMeasure& measure);
   /// Of a file with several items of which the setup names none.
   void warnOfDefaultItem(const TimeSeriesObject& series, const SeriesReference& reference, const std::string& name);
   /// Unless it has been given with another location, as for measures that compare the same item.

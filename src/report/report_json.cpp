@@ -200,12 +200,12 @@ void writePeriod(JsonWriter& json, const ReportedPeriod& period) {
 }
 
 /// The periods with the figures of the best evaluation in each; `whole` reaches over all of them.
-void writePeriodsOf(JsonWriter& json, const ReportData& data, const ShownSeries& whole) {
+void writePeriodsOf(JsonWriter& json, const ReportData& data, const ShownSeries& series, const ShownSeries& whole) {
   json.key("periods").beginArray();
   for (const ReportedPeriod& period : data.periods) {
     writePeriod(json.beginObject(), period);
     json.key("first").integer(epochMilliseconds(period.first)).key("last").integer(epochMilliseconds(period.last));
-    const ShownSeries part = partOf(whole, period.first, period.last);
+    const ShownSeries part = period.isValidation ? partOf(whole, period.first, period.last) : series;
     if (data.series.best) writeFigures(json, "best", fitFigures(part.best, part.observed));
     json.endObject();
   }
@@ -255,7 +255,7 @@ void writeSeries(JsonWriter& json, const ReportData& data) {
     }
     json.key("period").beginArray().integer(epochMilliseconds(data.periodFirst));
     json.integer(epochMilliseconds(data.periodLast)).endArray();
-    if (!data.periods.empty()) writePeriodsOf(json, data, whole);
+    if (!data.periods.empty()) writePeriodsOf(json, data, series, whole);
     json.key("figures").beginObject();
     if (data.series.initial) writeFigures(json, "initial", fitFigures(series.initial, series.observed));
     if (data.series.best) writeFigures(json, "best", fitFigures(series.best, series.observed));

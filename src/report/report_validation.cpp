@@ -2,16 +2,31 @@
 
 #include <algorithm>
 #include <cstddef>
+#include <cstdint>
+#include <limits>
 #include <type_traits>
 #include <utility>
 
 #include "common/calendar.h"
+#include "measures/observation_selection.h"
+#include "measures/period_series.h"
+#include "report/report_analyses.h"
 
 namespace mirevo {
 namespace {
 
 ReportedPeriod reportedPeriod(std::string name, const DateRecord& start, const DateRecord& end, bool isValidation) {
   return {std::move(name), formatDate(start), formatDate(end), secondNumber(start), secondNumber(end), isValidation};
+}
+
+/// Observations outside the period may count in one of validation.
+void leaveCounted(const EvaluationPeriod& period, ShownSeries& series) {
+  const std::int64_t first = secondNumber(period.start);
+  const std::int64_t last = secondNumber(period.end);
+  for (std::size_t i = 0; i < series.seconds.size() && i < series.observed.size(); ++i) {
+    const bool isInside = series.seconds[i] >= first && series.seconds[i] <= last;
+    if (!isInside) series.observed[i] = std::numeric_limits<float>::quiet_NaN();
+  }
 }
 
 }  // namespace
@@ -40,7 +55,13 @@ void addValidation(const RunConfig& config, std::span<const ResultRow> rows, con
     data.validation = validationTable(config.measures, config.validationPeriods, evaluations, best->number);
   }
   data.wholeSeries = data.series.series;
-  for (ShownSeries& series : data.series.series) series = partOf(series, data.periodFirst, data.periodLast);
+  for (ShownSeries& series : data.series.series) {
+    series = partOf(series, data.periodFirst, data.periodLast);
+    for (const std::size_t i : measuresOfDistinctPairs(config.measures)) {
+      if (pairName(config.measures, i) == series.measure)
+        leaveCounted(countedPeriod(config.measures[i], config.period), series);
+    }
+  }
 }
 
 }  // namespace mirevo

@@ -290,16 +290,15 @@ void RunReporter::recordSeries(const std::vector<double>& values, const Evaluati
 }
 
 std::string RunReporter::valuesText(const EvaluationResult& result) const {
-  constexpr std::size_t kMostMeasures = 3;  // so that the line stays short
+  constexpr std::size_t kMostMeasures = 8;  // so that the line stays short
   if (!result.ok()) return {};
   std::string text;
   const auto add = [&text](std::string_view what, double value) {
     text += fmt::format("{}{} {:.6g}", text.empty() ? "" : ", ", what, value);
   };
   const std::size_t measures = std::min(sources_.size(), result.measureValues.size());
-  for (std::size_t i = 0; i < measures && measures <= kMostMeasures; ++i) {
-    add(sources_[i].name, result.measureValues[i]);
-  }
+  for (std::size_t i = 0; i < std::min(measures, kMostMeasures); ++i) add(sources_[i].name, result.measureValues[i]);
+  if (measures > kMostMeasures) text += fmt::format(" and {}", countText(measures - kMostMeasures, "more measure"));
   if (result.objectiveValues.empty() || std::isnan(result.aggregate)) return text;
   add("aggregate", result.aggregate);
   if (best()) {

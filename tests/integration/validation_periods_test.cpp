@@ -92,6 +92,20 @@ TEST_F(ValidationPeriods, AreComputedLikeAnEvaluationPeriodAndChangeNothingElse)
   EXPECT_EQ(table().rows.at(0).at(4), best[count]);
 }
 
+TEST_F(ValidationPeriods, MayBeInTheWarmUpWhichIsNoCalibration) {
+  writeSetup({.option = 0, .scenarios = {"2, 1, 1"}});
+  std::string periods = kPeriods;
+  periods.replace(periods.find("2001-07-01"), 10, "2001-01-01").replace(periods.find("2001-12-31"), 10, "2001-01-20");
+  folder_.editSetup("Aggregation_Method = 0", "Warm_Up_Days = 30\n" + periods);
+  run();
+  EXPECT_EQ(log().find("no independent test"), std::string::npos);
+  EXPECT_THAT(log(), HasSubstr("151 of 181 observations in the evaluation period count"));
+  const std::string report = folder_.read("basin_Report.html");
+  for (const char* part : {R"("figures":{"initial":{"n":151,)", R"("best":{"n":20,)", R"("best":{"n":151,)"}) {
+    EXPECT_NE(report.find(part), std::string::npos) << part;
+  }
+}
+
 TEST_F(ValidationPeriods, AreQuantilesOfAnUncertaintyAnalysisAlsoInAJob) {
   if (!mpirunIsInstalled()) GTEST_SKIP() << "no mpirun";
   writeSetup({.option = 3, .maxEvaluations = 20});

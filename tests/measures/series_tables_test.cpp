@@ -95,7 +95,7 @@ TEST_F(SeriesTablesTest, WeightsThatCannotBeMeantEndTheRunOrAreWarnedOf) {
       {{.errorItem = 2, .qualityItem = 3, .leftOut = {3}},
        "Error: Invalid weight",
        "(E) is missing at 2001-01-04 00:00"},
-      {{.weightItem = 2}, "Error: Invalid weight", "expected a weight of 0 or more"},
+      {{.weightItem = 2}, "Error: Invalid weight", "expected a weight from 1e-12 to 1e12, or 0"},
       {{.weightItem = 4}, "Error: Item No. 4 not found in " + folder_ / "weighed.csv", "the file has 3 items"},
       {{.qualityItem = 3, .leftOut = {1, 3, 4}},
        "Error: No observation counts for output measure Flow",
@@ -120,6 +120,10 @@ TEST_F(SeriesTablesTest, WeightsThatCannotBeMeantEndTheRunOrAreWarnedOf) {
       EXPECT_THAT(message.empty() ? warnings.at(0) : refusal, HasSubstr(detail));
     }
   }
+  OutputMeasure flow = measure("sim.csv", "weighed.csv");
+  flow.weighting.errorItem = 2;
+  flow.selection.highestObserved = 5;
+  EXPECT_THAT(refusalOf([&] { SeriesTables::MirevoTSobjectInit(std::vector{flow}, kPeriod); }), StartsWith("accepted"));
 }
 
 TEST_F(SeriesTablesTest, ASelectionThatLeavesNoObservationEndsTheRunBeforeItBegins) {

@@ -92,6 +92,8 @@ std::vector<KeywordRow> pairingRows() {
       setting<Measure>([](auto& m) -> auto& { return m.timeMatch.offsetHours; },
                        {.name = "Time_Offset",
                         .defaultValue = "0.0",
+                        .range = between(-8784, 8784),
+                        .refusal = "Error: Time offset invalid for output measure ",
                         .unit = "h",
                         .meaning = "Simulated time is observed time plus this: -1 for a gauge in UTC+1 and a model in "
                                    "UTC."}),

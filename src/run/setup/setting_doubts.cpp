@@ -226,7 +226,11 @@ void warnOfValidation(const RunConfig& config, const SectionsRead& sections) {
     const ValidationPeriod& period = config.validationPeriods[i];
     if (!hasSeries) {
       sections.validationPeriods[i].warn("Start_Date", "without effect, no output measure compares series");
-    } else if (daysSince(config.period.start, period.end) >= 0.0 && daysSince(config.period.end, period.start) <= 0.0) {
+    } else if (std::ranges::any_of(config.measures, [&](const OutputMeasure& measure) {
+                 const EvaluationPeriod counted = countedPeriod(measure, config.period);
+                 return measure.interfaceType == InterfaceType::timeSeries &&
+                        daysSince(counted.start, period.end) >= 0.0 && daysSince(counted.end, period.start) <= 0.0;
+               })) {
       sections.validationPeriods[i].warn(
           "Start_Date", fmt::format("the validation period overlaps the evaluation period, {} to {}, and is no "
                                     "independent test of it",

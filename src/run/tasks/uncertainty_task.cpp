@@ -205,7 +205,13 @@ TaskOutcome UncertaintyTask::outcomeOf(const TaskContext& context, const Uncerta
 void UncertaintyTask::logBandTimes(const TaskContext& context) const {
   if (!keptSteps()) return;
   for (const ObservedSeries& series : context.observedSeries) {
-    const std::string& name = context.measures[series.measure].name;
+    const OutputMeasure& measure = context.measures[series.measure];
+    const std::string& name = measure.name;
+    if (!measure.timeMatch.isUsual()) {
+      context.log.line(
+          fmt::format("Band of {}: at the observations alone, because of its Time_Match or Time_Offset", name));
+      continue;
+    }
     context.log.line(bandTimesText(name, series));
     const std::size_t count = series.days.size();
     if (!settings.bandEnd || count < 2) continue;
@@ -213,8 +219,7 @@ void UncertaintyTask::logBandTimes(const TaskContext& context) const {
     if (daysSince(series.start, *settings.bandEnd) - last < last - series.days[count - 2]) continue;
     context.log.warning(fmt::format(
         "Band of {}: {} in the model's folder has no step at {} = {} or shortly before it, and the band ends earlier",
-        name, trimTrailing(context.measures[series.measure].simulation.fileName), kBandEndKeyword,
-        formatDate(*settings.bandEnd)));
+        name, trimTrailing(measure.simulation.fileName), kBandEndKeyword, formatDate(*settings.bandEnd)));
   }
 }
 
