@@ -160,7 +160,11 @@ SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> mea
     tables.usualSizes_.push_back(sizeOf(tables.simulationNames_[i]));
   }
   tables.checkItems(measures, period, isForRuns);
-  for (const OutputMeasure& measure : measures) requireShownAbove(measure);
+  for (const OutputMeasure& measure : measures) {
+    for (const std::string& doubt : requireShownAbove(measure, period)) {
+      tables.addWarning(measure.shownAbove.fileLocation, doubt);
+    }
+  }
   tables.releaseSimulationFiles();
   return tables;
 }

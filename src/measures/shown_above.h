@@ -1,6 +1,7 @@
 #pragma once
 
 #include <string>
+#include <vector>
 
 #include "measures/period_series.h"
 
@@ -15,7 +16,8 @@ struct NamedSeries {
 /// Throws FatalError, with the texts for files of observations, if the file or the item cannot be read.
 NamedSeries readShownAbove(const SeriesReference& reference, const EvaluationPeriod& period);
 
-/// Throws FatalError if the series that the measure has drawn above its hydrograph cannot be read. Nothing without one.
-void requireShownAbove(const OutputMeasure& measure);
+/// Throws FatalError if the series that the measure has drawn above its hydrograph cannot be read. Returns what may not
+/// be meant, for warnings; nothing without such a series.
+std::vector<std::string> requireShownAbove(const OutputMeasure& measure, const EvaluationPeriod& period);
 
 }  // namespace mirevo
