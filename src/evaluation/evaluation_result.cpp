@@ -56,6 +56,7 @@ void EvaluationResult::fail(EvaluationFailure why) {
   exactMeasures.clear();
   simulatedValues.clear();
   shownSeries.clear();
+  validationPairs.clear();
   unusedObservations.clear();
   pairs.clear();
   lastOutput.clear();

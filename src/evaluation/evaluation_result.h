@@ -53,9 +53,17 @@ std::optional<EvaluationFailure::Kind> failureKindOfKey(std::string_view key);
 
 /// A measure for some of whose observations the model run has no value; it is judged by the others.
 struct UnusedObservations {
-  std::size_t measure = 0;    ///< 0-based
+  std::size_t measure = 0;    ///< 0-based; behind the measures those in validation periods
   std::size_t usedCount = 0;  ///< observations that were used
   std::string text;           ///< one line for the log
+};
+
+/// The observations that a validation value is of, and those without a simulated value.
+struct ValidationPairs {
+  std::size_t count = 0;
+  std::size_t missingCount = 0;
+
+  bool operator==(const ValidationPairs&) const = default;
 };
 
 /// Least, mean and largest of some values.
@@ -95,6 +103,7 @@ struct EvaluationResult {
   /// One per entry of validationTargets(), NaN where there is none, as for a failed evaluation. Nothing depends on
   /// them.
   std::vector<double> validationValues;
+  std::vector<ValidationPairs> validationPairs;  ///< one per value; empty if failed, and for one of an earlier run
   /// If the task asks for them, the output measures in 64 bits, from all digits of the series; a number that the model
   /// wrote is the one of `measureValues`. Empty for a failed evaluation.
   std::vector<double> exactMeasures;

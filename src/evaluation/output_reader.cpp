@@ -38,6 +38,11 @@ ValueSummary summaryOf(const Values& values) {
   return {*least, sum / static_cast<double>(values.size()), *largest};
 }
 
+/// What a simulated item does that has no value for some observations.
+const char* lackAtTimesOf(const OutputMeasure& measure) {
+  return measure.timeMatch.kind == TimeMatch::mean ? "lacks a value on their day" : "has no value at their time";
+}
+
 MeasurePairs pairsOf(std::size_t measure, const MeasureStatistics& statistics, const TimeSeriesObject& simulation,
                      const FileForm& file) {
   const std::int64_t start = secondNumber(simulation.startTime().value());
@@ -183,11 +188,28 @@ EvaluationResult OutputReader::read(const OutputFiles& files) {
                                               trimTrailing(description_.objectives[i].name), formatReal(*objective))));
   }
   result.aggregate = aggregator_.aggregate(result.objectiveValues);
-  for (const Validated& one : validated_) {
-    result.validationValues.push_back(
-        validationValue(one.measure, one.period, series_.simulation(one.index), series_.observation(one.index)));
-  }
+  validate(result);
   return result;
+}
+
+void OutputReader::validate(EvaluationResult& result) {
+  for (std::size_t k = 0; k < validated_.size(); ++k) {
+    const Validated& one = validated_[k];
+    const ValidationValue found =
+        validationValue(one.measure, one.period, series_.simulation(one.index), series_.observation(one.index));
+    result.validationValues.push_back(found.value);
+    result.validationPairs.push_back({found.pairCount, found.missingCount});
+    if (found.missingCount == 0) continue;
+    const std::size_t period = validationTargets(description_.measures, description_.validationPeriods)[k].period;
+    result.unusedObservations.push_back(
+        {description_.measures.size() + k, found.pairCount,
+         fmt::format("output measure {}: {} of {} observations in the validation period {} are not used, as item No. "
+                     "{} of {} {}{}",
+                     quotedForMessage(one.measure.name), found.missingCount, found.pairCount + found.missingCount,
+                     quotedForMessage(description_.validationPeriods[period].name), one.measure.simulation.itemNo,
+                     trimTrailing(one.measure.simulation.fileName), lackAtTimesOf(one.measure),
+                     found.firstUnused ? "; the first is at " + formatDate(*found.firstUnused) : "")});
+  }
 }
 
 std::vector<PeriodSeries> OutputReader::readShownSeries() {
@@ -335,8 +357,7 @@ void OutputReader::noteUnusedObservations(std::size_t i, const MeasureStatistics
            "output measure \"{}\": {} of {} observations in the evaluation period are not used, as item No. {} of "
            "{} {}; the first is at {}",
            trimTrailing(measure.name), statistics.observationCount - pairs, statistics.observationCount,
-           measure.simulation.itemNo, trimTrailing(measure.simulation.fileName),
-           measure.timeMatch.kind == TimeMatch::mean ? "lacks a value on their day" : "has no value at their time",
+           measure.simulation.itemNo, trimTrailing(measure.simulation.fileName), lackAtTimesOf(measure),
            formatDate(*statistics.firstUnused))});
 }
 

@@ -77,6 +77,8 @@ class OutputReader final {
     EvaluationPeriod period;
   };
   void prepareValidation();
+  /// Fills in the measures in the validation periods.
+  void validate(EvaluationResult& result);
   static std::optional<EvaluationFailure> findMissing(const OutputFiles& files);
   /// Fills in the measures and simulated values and leaves the series open; returns a failure if the model's output
   /// cannot be used.

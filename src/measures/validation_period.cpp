@@ -11,6 +11,7 @@
 #include "common/text.h"
 #include "measures/dates.h"
 #include "measures/measure_statistics.h"
+#include "measures/observed_series.h"
 
 namespace mirevo {
 namespace {
@@ -66,16 +67,23 @@ EvaluationPeriod hullOf(const EvaluationPeriod& evaluation, std::span<const Vali
   return hull;
 }
 
-double validationValue(const OutputMeasure& measure, const EvaluationPeriod& period, TimeSeriesObject& simulation,
-                       TimeSeriesObject& observation) {
-  constexpr double kNone = std::numeric_limits<double>::quiet_NaN();
+ValidationValue validationValue(const OutputMeasure& measure, const EvaluationPeriod& period,
+                                TimeSeriesObject& simulation, TimeSeriesObject& observation) {
+  ValidationValue found{.value = std::numeric_limits<double>::quiet_NaN()};
   try {
-    if (!hasPairs(measure, period, simulation, observation)) return kNone;
-    const double value = measureValue(measure, period, simulation, observation);
-    return std::isfinite(value) ? value : kNone;
+    if (!hasPairs(measure, period, simulation, observation)) {
+      found.missingCount = readObservedSeries(0, measure, period, SeriesPrecision::single, observation).values.size();
+      return found;
+    }
+    const MeasureStatistics statistics = computeMeasureStatistics(measure, period, simulation, observation);
+    found.pairCount = statistics.simulatedValues.size();
+    found.missingCount = statistics.observationCount - found.pairCount;
+    found.firstUnused = statistics.firstUnused;
+    const double value = selectStatistic(statistics, measure.statisticType);
+    if (std::isfinite(value)) found.value = value;
   } catch (const FatalError&) {  // no reason to end a run: nothing depends on the value
-    return kNone;
   }
+  return found;
 }
 
 }  // namespace mirevo

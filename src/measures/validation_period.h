@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <optional>
 #include <span>
 #include <string>
 #include <vector>
@@ -41,8 +42,15 @@ EvaluationPeriod judgedAs(const ValidationPeriod& period, const EvaluationPeriod
 /// From the first to the last day of all periods.
 EvaluationPeriod hullOf(const EvaluationPeriod& evaluation, std::span<const ValidationPeriod> periods);
 
-/// The statistic of the measure in the period; NaN if it has no value there, whatever the reason.
-double validationValue(const OutputMeasure& measure, const EvaluationPeriod& period, TimeSeriesObject& simulation,
-                       TimeSeriesObject& observation);
+/// A measure in a validation period.
+struct ValidationValue {
+  double value = 0.0;                          ///< its statistic; NaN if it has none, whatever the reason
+  std::size_t pairCount = 0;                   ///< observations with a simulated value
+  std::size_t missingCount = 0;                ///< those without
+  std::optional<DateRecord> firstUnused = {};  ///< time of the first without, if there are also some with one
+};
+
+ValidationValue validationValue(const OutputMeasure& measure, const EvaluationPeriod& period,
+                                TimeSeriesObject& simulation, TimeSeriesObject& observation);
 
 }  // namespace mirevo

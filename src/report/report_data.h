@@ -170,6 +170,7 @@ struct ReportData {
   std::vector<std::string> runNames;    ///< of the evaluations, from the first on; empty where one has none
   std::vector<ReportedPeriod> periods;  ///< the evaluation period, and those of validation; empty without any of these
   ValidationTable validation;
+  bool bestLacksValidation = false;      ///< the series of the best evaluation are there in the evaluation period alone
   std::vector<ShownSeries> wholeSeries;  ///< `series` from the first to the last period; empty without `periods`
   std::vector<ReportedBand> bands;
   std::optional<ReportedSensitivity> sensitivity;

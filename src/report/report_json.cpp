@@ -206,7 +206,8 @@ void writePeriodsOf(JsonWriter& json, const ReportData& data, const ShownSeries&
     writePeriod(json.beginObject(), period);
     json.key("first").integer(epochMilliseconds(period.first)).key("last").integer(epochMilliseconds(period.last));
     const ShownSeries part = period.isValidation ? partOf(whole, period.first, period.last) : series;
-    if (data.series.best) writeFigures(json, "best", fitFigures(part.best, part.observed));
+    const bool isThere = data.series.best && !(period.isValidation && data.bestLacksValidation);
+    if (isThere) writeFigures(json, "best", fitFigures(part.best, part.observed));
     json.endObject();
   }
   json.endArray();

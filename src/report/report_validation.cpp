@@ -54,6 +54,13 @@ void addValidation(const RunConfig& config, std::span<const ResultRow> rows, con
     }
     data.validation = validationTable(config.measures, config.validationPeriods, evaluations, best->number);
   }
+  for (const std::string& line : data.series.headLines) {
+    if (!line.starts_with("The series of the best evaluation") ||
+        line.find(kInEvaluationPeriodAlone) == std::string::npos)
+      continue;
+    data.bestLacksValidation = true;
+    data.run.notes.push_back(line + ". The figures of the validation periods that are made from them are left out.");
+  }
   data.wholeSeries = data.series.series;
   for (ShownSeries& series : data.series.series) {
     series = partOf(series, data.periodFirst, data.periodLast);

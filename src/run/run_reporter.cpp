@@ -274,8 +274,8 @@ void RunReporter::count(const std::vector<double>& parameterValues, const Evalua
   }
   initial_.consider(result.number, parameterValues);
   if (keepsJudged_) {
-    judged_[result.number] = {result.number, result.aggregate, parameterValues, result.measureValues,
-                              result.validationValues};
+    judged_[result.number] = {result.number,        result.aggregate,        parameterValues,
+                              result.measureValues, result.validationValues, result.validationPairs};
   }
   if (std::isnan(result.aggregate)) {
     unsettled_.push_back({result.number, parameterValues, result.objectiveValues});

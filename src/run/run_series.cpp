@@ -98,7 +98,13 @@ std::unique_ptr<SeriesRecorder> openSeries(const RunConfig& config, const Search
   warnOfLastDay(config, output, log);
   run.initialValues = ToModelScale(space, space.initial);
   run.kept = keptSeries(config, output);
-  run.keepsSteps = config.task && config.task->keptSteps();
+  const auto steps = config.task ? config.task->keptSteps() : std::nullopt;
+  run.keepsSteps = steps.has_value();
+  run.evaluationFirst = secondNumber(config.period.start);
+  run.evaluationLast = secondNumber(config.period.end);
+  run.keepsAllPeriods =
+      config.validationPeriods.empty() || (steps && run.evaluationFirst <= run.periodFirst &&
+                                           secondNumber(steps->end.value_or(config.period.end)) >= run.periodLast);
   auto series = std::make_unique<SeriesRecorder>(path, std::move(run), runTimeClock,
                                                  [&log](std::string_view text) { log.warning(text); });
   if (goesOn) {

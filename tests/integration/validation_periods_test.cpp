@@ -110,6 +110,9 @@ TEST_F(ValidationPeriods, AreQuantilesOfAnUncertaintyAnalysisAlsoInAJob) {
   if (!mpirunIsInstalled()) GTEST_SKIP() << "no mpirun";
   writeSetup({.option = 3, .maxEvaluations = 20});
   folder_.editSetup("Aggregation_Method = 0", kPeriods);
+  folder_.editSetup("Start_Date = 1990-01-01\n        End_Date = 1990-12-31",
+                    "Start_Date = 2001-12-01\n        End_Date = 2002-01-01");
+  folder_.write("observed.csv", folder_.read("observed.csv") + "2002-01-01,5\n");  // the model ends before
   run();
   const auto found = [this] { return results() + folder_.read("basin_Quantiles.dat"); };
   const std::string alone = found();
@@ -117,6 +120,8 @@ TEST_F(ValidationPeriods, AreQuantilesOfAnUncertaintyAnalysisAlsoInAJob) {
   RunningProgram job = startJob(3, {setup_});
   EXPECT_EQ(job.wait().exitCode, 0);
   EXPECT_EQ(found(), alone);
+  EXPECT_THAT(log(), AllOf(HasSubstr("\"flow\": 1 of 32 observations in the validation period \"2001-12-01 to "),
+                           HasSubstr("\nflow in 2001-12-01 to 2002-01-01: of 31 of 32 observations in evaluation ")));
 }
 
 }  // namespace

@@ -53,8 +53,9 @@ template <>
 struct Layout<EvaluationResult> {
   static void of(auto& archive, auto& result) {
     archive(result.measureValues, result.objectiveValues, result.aggregate, result.validationValues,
-            result.exactMeasures, result.simulatedValues, result.failure, result.unusedObservations, result.pairs,
-            result.lastOutput, result.warnings, result.unkeptFiles, result.absentFiles, result.shownSeries);
+            result.validationPairs, result.exactMeasures, result.simulatedValues, result.failure,
+            result.unusedObservations, result.pairs, result.lastOutput, result.warnings, result.unkeptFiles,
+            result.absentFiles, result.shownSeries);
   }
 };
 template <>
@@ -66,6 +67,10 @@ struct Layout<RunStandard> {
   static void of(auto& archive, auto& standard) {
     archive(standard.anyHasSucceeded, standard.firstNumber, standard.firstCounts, standard.withoutLineEnds);
   }
+};
+template <>
+struct Layout<ValidationPairs> {
+  static void of(auto& archive, auto& pairs) { archive(pairs.count, pairs.missingCount); }
 };
 template <>
 struct Layout<MeasurePairs> {

@@ -25,6 +25,23 @@ std::size_t stepCount(const std::vector<PeriodSeries>& series) {
   return count;
 }
 
+constexpr std::string_view kAreThere = ", are there ";
+constexpr std::string_view kNoOthers = ": the earlier run left no others";
+
+std::string beginOfLack(std::string_view which, int number) {
+  return fmt::format("The series of the {} evaluation, No. {}{}", which, number, kAreThere);
+}
+
+/// The inverse: where alone the series of the file are, as its head says.
+std::string lackOf(std::string_view which, int number, const SeriesTable& table) {
+  const std::string begin = beginOfLack(which, number);
+  for (const std::string& line : table.headLines) {
+    if (!line.starts_with(begin) || !line.ends_with(kNoOthers)) continue;
+    return line.substr(begin.size(), line.size() - kNoOthers.size() - begin.size());
+  }
+  return {};
+}
+
 bool isSame(std::span<const double> a, std::span<const double> b) {
   return std::equal(a.begin(), a.end(), b.begin(), b.end());
 }
@@ -40,11 +57,13 @@ SeriesRecorder::SeriesRecorder(std::string path, RecordedSeries run, std::functi
       initialChoice_(run_.initialValues) {}
 
 void SeriesRecorder::resume(const SeriesTable& table) {
-  const auto takeOver = [&](const std::optional<ShownEvaluation>& evaluation, std::vector<float> ShownSeries::*column) {
+  const auto takeOver = [&](std::string_view which, const std::optional<ShownEvaluation>& evaluation,
+                            std::vector<float> ShownSeries::*column) {
     std::optional<Held> held;
     if (!evaluation) return held;
     held = Held{};
     held->evaluation = *evaluation;
+    held->lack = lackOf(which, evaluation->number, table);
     bool isThere = false;
     for (const std::string& measure : run_.measures) {
       PeriodSeries& series = held->series.emplace_back();
@@ -57,9 +76,9 @@ void SeriesRecorder::resume(const SeriesTable& table) {
     if (!isThere) held.reset();  // the file says so, and they may come again
     return held;
   };
-  initial_ = takeOver(table.initial, &ShownSeries::initial);
+  initial_ = takeOver("initial", table.initial, &ShownSeries::initial);
   if (initial_) initialChoice_.resume(initial_->evaluation.number, table.isOfInitialParameters);
-  best_ = takeOver(table.best, &ShownSeries::best);
+  best_ = takeOver("best", table.best, &ShownSeries::best);
   earlierBest_ = best_;
   isChanged_ = initial_.has_value();
 }
@@ -103,10 +122,19 @@ void SeriesRecorder::evaluationPassed(const EvaluationResult& result, std::span<
 std::optional<SeriesRecorder::Held> SeriesRecorder::heldOfKept(const EvaluationResult& result,
                                                                std::span<const double> values) const {
   if (run_.kept.empty() || result.simulatedValues.empty()) return std::nullopt;
-  Held held{{result.number, result.aggregate}, {values.begin(), values.end()}, {}, !run_.keepsSteps};
+  Held held{{result.number, result.aggregate}, {values.begin(), values.end()}, {}};
+  if (!run_.keepsAllPeriods) {
+    held.lack = run_.keepsSteps ? kInEvaluationPeriodAlone
+                                : fmt::format("at the times of the observations {}", kInEvaluationPeriodAlone);
+  } else if (!run_.keepsSteps) {
+    held.lack = "at the times of the observations alone";
+  }
   for (const KeptSeries& kept : run_.kept) {
     PeriodSeries& series = held.series.emplace_back();
     for (std::size_t i = 0; i < kept.seconds.size(); ++i) {
+      // The part of a validation period that was kept by chance would be taken for the whole.
+      const bool isOut = kept.seconds[i] < run_.evaluationFirst || kept.seconds[i] > run_.evaluationLast;
+      if (!run_.keepsAllPeriods && isOut) continue;
       const std::size_t index = kept.first + i;
       const double value = index < result.simulatedValues.size() ? result.simulatedValues[index] : std::nan("");
       series.seconds.push_back(kept.seconds[i]);
@@ -127,7 +155,8 @@ void SeriesRecorder::holdUnsettled(Held held) {
 /// Keeps the series of the run's best evaluation: the one that has just finished, or one whose aggregate was not known
 /// when it finished.
 void SeriesRecorder::follow(const std::optional<BestEvaluation>& best, const Held* finished) {
-  if (!best || (best_ && best_->evaluation.number == best->number && !best_->series.empty())) return;
+  const bool isThere = best && best_ && best_->evaluation.number == best->number && !best_->series.empty();
+  if (!best || (isThere && (finished == nullptr || best_->lack.empty()))) return;
   const auto waiting = unsettled_.find(best->number);
   if (finished != nullptr) {
     best_ = *finished;
@@ -173,12 +202,9 @@ std::vector<std::string> SeriesRecorder::notes() const {
   std::vector<std::string> lines;
   const auto add = [&](std::string_view which, int number, const std::optional<Held>& held) {
     if (!held || held->series.empty()) {
-      lines.push_back(missing(which, number));
-    } else if (held->isOfKept) {
-      lines.push_back(
-          fmt::format("The series of the {} evaluation, No. {}, are there at the times of the observations "
-                      "alone: the earlier run left no others",
-                      which, number));
+      if (hasEnded_) lines.push_back(missing(which, number));  // before, they may still come
+    } else if (!held->lack.empty()) {
+      lines.push_back(beginOfLack(which, number) + held->lack + std::string(kNoOthers));
     }
   };
   if (const auto& number = initialChoice_.number()) add("initial", *number, initial_);
@@ -200,10 +226,8 @@ void SeriesRecorder::write() {
   const double begun = clock_();
   SeriesTable table;
   table.headLines = run_.headLines;
-  if (hasEnded_) {
-    const std::vector<std::string> lines = notes();
-    table.headLines.insert(table.headLines.end(), lines.begin(), lines.end());
-  }
+  const std::vector<std::string> lines = notes();
+  table.headLines.insert(table.headLines.end(), lines.begin(), lines.end());
   table.task = run_.task;
   if (initial_) table.initial = initial_->evaluation;
   table.isOfInitialParameters = initialChoice_.hasSetupValues();

@@ -36,6 +36,9 @@ struct RecordedSeries {
   std::vector<double> initialValues;  ///< initial values of the variable parameters, model scale
   std::vector<KeptSeries> kept = {};  ///< of the pairs, for a task that keeps the simulated values of all evaluations
   bool keepsSteps = false;            ///< at the simulated steps, too
+  bool keepsAllPeriods = true;        ///< what is kept reaches over the validation periods, too
+  std::int64_t evaluationFirst = 0;   ///< secondNumber() of the ends of the evaluation period; not used if it does
+  std::int64_t evaluationLast = 0;
 };
 
 /// Keeps `<setup>_Series.dat`: the simulated series of the initial and of the best evaluation so far. The file is
@@ -55,7 +58,7 @@ class SeriesRecorder final {
                           const std::optional<BestEvaluation>& best);
 
   /// Takes a successful evaluation of an earlier run. Of its series there is what resume() has taken over, or else what
-  /// was kept of its simulated values, at the times of the observations.
+  /// was kept of its simulated values: at the times of the observations, and often in the evaluation period alone.
   void evaluationPassed(const EvaluationResult& result, std::span<const double> values,
                         const std::optional<BestEvaluation>& best);
 
@@ -72,7 +75,7 @@ class SeriesRecorder final {
     ShownEvaluation evaluation;
     std::vector<double> values;
     std::vector<PeriodSeries> series;  ///< empty if they are not there
-    bool isOfKept = false;             ///< at the times of the observations alone
+    std::string lack = {};             ///< where alone they are; empty: everywhere
   };
   void holdInitial(const EvaluationResult& result, std::span<const double> values);
   void holdUnsettled(Held held);

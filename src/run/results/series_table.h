@@ -29,6 +29,9 @@ struct ShownSeries {
   std::vector<float> best;
 };
 
+/// In a head line: the series of an evaluation have no values in the validation periods, though the model had.
+inline constexpr std::string_view kInEvaluationPeriodAlone = "in the evaluation period alone";
+
 /// The content of `<setup>_Series.dat`: the simulated series of a run's initial and its best evaluation beside the
 /// observed ones.
 struct SeriesTable {

@@ -52,6 +52,38 @@ ValidationRange rangeOf(const JudgedEvaluation& best, std::span<const JudgedEval
   return {valueOf(best), sortedQuantile(values, 0.0), sortedQuantile(values, kMedian), sortedQuantile(values, 1.0)};
 }
 
+/// Of how many observations the value is, unless it is of all in every evaluation of which that is known.
+std::string lackOf(std::size_t value, const JudgedEvaluation& best, std::span<const JudgedEvaluation* const> tenth,
+                   std::span<const JudgedEvaluation> evaluations) {
+  std::size_t known = 0;
+  std::size_t lacking = 0;
+  for (const JudgedEvaluation& one : evaluations) {
+    if (one.pairs.empty()) continue;
+    ++known;
+    if (one.pairs[value].missingCount > 0) ++lacking;
+  }
+  if (lacking == 0) return {};
+  std::vector<std::size_t> counts;
+  for (const JudgedEvaluation* one : tenth) {
+    if (!one->pairs.empty()) counts.push_back(one->pairs[value].count);
+  }
+  std::sort(counts.begin(), counts.end());
+  std::string text = fmt::format(
+      "of a number of observations that is not known in evaluation {}, which an earlier run "
+      "made",
+      best.number);
+  if (!best.pairs.empty()) {
+    const ValidationPairs& pairs = best.pairs[value];
+    text = fmt::format("of {} of {} observations in evaluation {}", pairs.count, pairs.count + pairs.missingCount,
+                       best.number);
+  }
+  if (!counts.empty()) {
+    const std::string most = counts.front() == counts.back() ? "" : fmt::format(" to {}", counts.back());
+    text += fmt::format(", of {}{} in the best tenth", counts.front(), most);
+  }
+  return text + fmt::format("; in {} of {} evaluations some have no simulated value", lacking, known);
+}
+
 }  // namespace
 
 ValidationTable validationTable(std::span<const OutputMeasure> measures, std::span<const ValidationPeriod> periods,
@@ -77,6 +109,10 @@ ValidationTable validationTable(std::span<const OutputMeasure> measures, std::sp
     }
     table.values[k % table.measures.size()].push_back(
         rangeOf(*best, tenth, [k](const auto& one) { return one.validation[k]; }));
+    if (const std::string lack = lackOf(k, *best, tenth, evaluations); !lack.empty()) {
+      table.lacks.push_back(
+          fmt::format("{} in {}: {}", trimTrailing(measures[measure].name), periods[targets[k].period].name, lack));
+    }
   }
   return table;
 }
@@ -103,6 +139,7 @@ std::vector<std::string> validationLines(const ValidationTable& table) {
                                                                             "sets by their aggregates",
                                                                             table.tenth, table.count))};
   for (std::string& line : formatTable("Output measure", table.periods, names, rows)) lines.push_back(std::move(line));
+  lines.insert(lines.end(), table.lacks.begin(), table.lacks.end());
   return lines;
 }
 

@@ -5,6 +5,7 @@
 #include <string>
 #include <vector>
 
+#include "evaluation/evaluation_result.h"
 #include "measures/output_measure.h"
 #include "measures/validation_period.h"
 
@@ -16,7 +17,8 @@ struct JudgedEvaluation {
   double aggregate = 0.0;  ///< NaN while it is not known
   std::vector<double> parameters;
   std::vector<double> measures;
-  std::vector<double> validation;  ///< one per entry of validationTargets()
+  std::vector<double> validation;           ///< one per entry of validationTargets()
+  std::vector<ValidationPairs> pairs = {};  ///< one per value; empty where they are not known
 };
 
 /// A measure in one period: of the best evaluation, and of the best tenth. NaN where there is none.
@@ -34,8 +36,9 @@ struct ValidationTable {
   std::vector<std::string> names;                    ///< of them
   std::vector<std::vector<ValidationRange>> values;  ///< one row per measure, one column per period
   int bestNumber = 0;
-  std::size_t tenth = 0;  ///< evaluations in the best tenth; 0 where none is told apart
-  std::size_t count = 0;  ///< successful evaluations of different sets, of which it is the tenth
+  std::size_t tenth = 0;           ///< evaluations in the best tenth; 0 where none is told apart
+  std::size_t count = 0;           ///< successful evaluations of different sets, of which it is the tenth
+  std::vector<std::string> lacks;  ///< one line per value that some evaluations have of fewer observations
 };
 
 /// `evaluations` in any order; the best tenth are those with the smallest aggregates, a parameter set counting once. It

@@ -167,6 +167,7 @@ TEST_F(RankWorkerTest, AKillFileThatTheMasterDoesNotAnswerEndsTheJob) {
 TEST(RankMessages, ContentThatWasCutOrHasMoreIsRefused) {
   const ResultMessage message{{.measureValues = {1.0, -0.0},
                                .validationValues = {2.5},
+                               .validationPairs = {{3, 4}},
                                .shownSeries = {{{10, 20}, {1.0F, 2.0F}}, {}},
                                .failure = EvaluationFailure{EvaluationFailure::Kind::signal, "why", {"a", ""}},
                                .warnings = {"careful"}},
@@ -175,6 +176,7 @@ TEST(RankMessages, ContentThatWasCutOrHasMoreIsRefused) {
   const std::string content = encode(message);
   EXPECT_EQ(encode(decodeResult(content)), content);
   EXPECT_EQ(decodeResult(content).result.validationValues, message.result.validationValues);
+  EXPECT_EQ(decodeResult(content).result.validationPairs, message.result.validationPairs);
   for (const int kind : {-1, 13}) {
     ResultMessage other = message;
     other.result.failure->kind = static_cast<EvaluationFailure::Kind>(kind);

@@ -206,5 +206,34 @@ TEST_F(SeriesRecorderTest, OfAnEarlierRunShowsTheTrueBestFromWhatWasKeptOrSaysTh
   EXPECT_THAT(table().series.at(0).best, ElementsAre(2.0F, 2.0F, 2.0F));
 }
 
+TEST_F(SeriesRecorderTest, OfKeptValuesThatDoNotReachOverAllPeriodsKeepsNoneOfAValidationPeriodAndSaysSoAgain) {
+  const auto runOf = [this] {
+    return SeriesRecorder(
+        folder_ / "s_Series.dat",
+        {.measures = {"flow"},
+         .observations = {{{10, 20, 30}, {1.0F, 2.0F, 3.0F}}},
+         .periodFirst = 10,
+         .periodLast = 30,
+         .kept = {{0, {10, 15, 20}}},
+         .keepsSteps = true,
+         .keepsAllPeriods = false,
+         .evaluationFirst = 10,
+         .evaluationLast = 15},
+        [this] { return now_; }, [](std::string_view) {});
+  };
+  const BestEvaluation best{1, 6.0, {1.0}};
+  for (int i = 0; i < 2; ++i) {
+    SeriesRecorder run = runOf();
+    if (i == 1) run.resume(table());
+    run.evaluationPassed({.number = 1, .aggregate = 6.0, .simulatedValues = {1.5, 1.6, 1.7}}, best.parameterValues,
+                         best);
+    run.finish(best);
+    const auto gap = NanSensitiveFloatEq(std::nanf(""));
+    EXPECT_THAT(table().series.at(0).best, ElementsAre(1.5F, 1.6F, gap, gap));
+    EXPECT_THAT(folder_.read("s_Series.dat"),
+                HasSubstr("best evaluation, No. 1, are there in the evaluation period alone: the earlier run left"));
+  }
+}
+
 }  // namespace
 }  // namespace mirevo

@@ -31,6 +31,16 @@ TEST(ValidationTable, TheBestTenthHoldsEachSetOnce) {
           "     least of the best tenth              0.5             10            100",
           "     median of the best tenth               1             20            200",
           "     largest of the best tenth            1.5             30            300"));
+  evaluations[0].pairs = {{7, 0}, {3, 4}};
+  evaluations[1].pairs = {{7, 0}, {5, 2}};
+  const char* const kLack =
+      "flow in late: of 3 of 7 observations in evaluation 1, of 3 to 5 in the best tenth; "
+      "in 2 of 2 evaluations some have no simulated value";
+  EXPECT_THAT(validationTable(measures, periods, evaluations, 1).lacks, testing::ElementsAre(kLack));
+  evaluations[0].pairs.clear();
+  EXPECT_THAT(validationTable(measures, periods, evaluations, 1).lacks,
+              testing::ElementsAre(
+                  testing::HasSubstr("that is not known in evaluation 1, which an earlier run made, of 5 in ")));
   for (JudgedEvaluation& evaluation : evaluations) evaluation.aggregate = 0.0;
   EXPECT_EQ(validationTable(measures, periods, evaluations, 1).tenth, 0U) << "no evaluation is better than another";
   EXPECT_TRUE(validationLines(validationTable(measures, periods, evaluations, 99)).empty());
