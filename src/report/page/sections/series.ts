@@ -58,11 +58,11 @@ function outsidePeriod(look: Look, times: number[], period: Series['period']): o
   return areas.length === 0 ? {} : { markArea: { silent: true, itemStyle: { color: look.rule, opacity: 0.45 }, data: areas.map(([from, to]) => [{ xAxis: from }, { xAxis: to }]) } };
 }
 
-/** A line and the dots on it; both have one entry in the legend. */
+/** A line and the dots on it; both have one entry in the legend. Not sampled by the library, which joins lines over gaps. */
 function drawnLine(name: string, line: Line, log: boolean, color: string, more: object): object[] {
   const { dots } = line;
   return [
-    { name, type: 'line', symbol: 'none', sampling: 'lttb', connectNulls: false, color, data: pointsOf(line, log), ...more },
+    { name, type: 'line', symbol: 'none', connectNulls: false, color, data: pointsOf(line, log), ...more },
     ...(dots.length > 0 ? [{ name, type: 'scatter', symbolSize: 5, itemStyle: { color }, large: dots.length > 3000, ...more,
       data: dots.filter(([, value]) => !log || value > 0) }] : []),
   ];

@@ -132,14 +132,14 @@ function bandPlan(band: Band): ChartPlan {
       const shown = is('log') ? { ...band, p5: band.p5.map(positive), p95: band.p95.map(positive) } : band;
       const points = (places: Place[], values: Maybe[]) => places.map((place, index) =>
         (place === null ? [times[places[index + 1]!]!, null] : [times[place]!, scaled(values[place])]));
-      const lines = { type: 'line', symbol: 'none', connectNulls: false, sampling: 'lttb' };
+      const lines = { type: 'line', symbol: 'none', connectNulls: false }; // not sampled by the library, which joins lines over gaps
       const [first, last] = [times[0]!, times[times.length - 1]!];
       return {
         legend: legend(look, { data: ['5 to 95 %', ...lineEntries(['median', 'observed'])], itemWidth: 34 }),
         grid: { left: 72, right: 16, top: 36, bottom: 72 },
         xAxis: [axis(look, { type: 'time', min: first, max: last })],
         yAxis: axis(look, { name: labelOf(band), log: is('log'), nameGap: 48, ...(is('log') ? {} : { scale: false }) }),
-        dataZoom: timeZoom(look, [0], 'none', (time) => moment(time, step)),
+        dataZoom: timeZoom(look, [0], 'filter', (time) => moment(time, step)),
         tooltip: tooltip(look, { trigger: 'axis', formatter: (found: { axisValue: number }[]) => {
           const place = nearest(times, found[0]!.axisValue);
           return tip(moment(times[place]!, step), [['observed', number(band.observed[place])], ['median', number(band.p50[place])],
@@ -149,10 +149,10 @@ function bandPlan(band: Band): ChartPlan {
         series: [
           {
             name: '5 to 95 %', type: 'custom', color: look.band, clip: true, tooltip: { show: false },
-            // One item draws the whole band; its two corners give the axes their extent.
-            data: [[first, finite(shown.p5).reduce((a, b) => Math.min(a, b), Infinity)], [last, finite(shown.p95).reduce((a, b) => Math.max(a, b), -Infinity)]],
-            renderItem: (info: { dataIndex: number; coordSys: { x: number; width: number } }, api: CustomApi & { size: (of: number[]) => number[] }) => {
-              if (info.dataIndex > 0) return null;
+            // The first place in view draws the whole band; all of them give the value axis its extent.
+            encode: { x: 0, y: [1, 2] }, data: times.map((time, place) => [time, shown.p5[place], shown.p95[place]]), progressive: 0,
+            renderItem: (info: { dataIndexInside: number; coordSys: { x: number; width: number } }, api: CustomApi & { size: (of: number[]) => number[] }) => {
+              if (info.dataIndexInside > 0) return null;
               const origin = api.coord([first, api.value(1)])[0]!;
               const scale = api.size([1, 0])[0]!;
               const from = Math.max(0, times.findIndex((time) => origin + (time - first) * scale >= info.coordSys.x) - 1);
