@@ -58,11 +58,12 @@ export function outsidePeriod(look: Look, times: number[], period: Series['perio
   return areas.length === 0 ? {} : { markArea: { silent: true, itemStyle: { color: look.rule, opacity: 0.45 }, data: areas.map(([from, to]) => [{ xAxis: from }, { xAxis: to }]) } };
 }
 
-/** A line and the dots on it; both have one entry in the legend. Not sampled by the library, which joins lines over gaps. */
+/** A line and the dots on it; both have one entry in the legend. The library's sampling joins lines over gaps. */
 function drawnLine(name: string, line: Line, log: boolean, color: string, more: object): object[] {
   const { dots } = line;
+  const data = pointsOf(line, log);
   return [
-    { name, type: 'line', symbol: 'none', connectNulls: false, color, data: pointsOf(line, log), ...more },
+    { name, type: 'line', symbol: 'none', sampling: data.some(Number.isNaN) ? undefined : 'lttb', connectNulls: false, color, data, ...more },
     ...(dots.length > 0 ? [{ name, type: 'scatter', symbolSize: 5, itemStyle: { color }, large: dots.length > 3000, ...more,
       data: dots.filter(([, value]) => !log || value > 0) }] : []),
   ];
