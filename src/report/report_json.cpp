@@ -184,8 +184,9 @@ void writeScenarios(JsonWriter& json, const ReportData& data, const std::string&
     ShownSeries shown{measure, one.series.seconds, none, none, one.series.values};
     const DrawnLine line = drawnSimulated(shown.seconds, shown.best, shown.observed);
     const std::size_t most = mostDrawnTimes(data.scenarioSeries.size());
-    if (shown.seconds.size() > most) shown = thinned(shown, most);
-    json.beginObject().member("number", one.number);
+    const bool isThinned = shown.seconds.size() > most;
+    if (isThinned) shown = thinned(shown, most);
+    json.beginObject().member("number", one.number).member("thinned", isThinned);
     writeTimes(json, shown.seconds);
     json.key("values").numbers(shown.best, Digits::drawn);
     writeBreaks(json, "breaks", line);

@@ -286,12 +286,13 @@ function zooming(zoom: ChartPlan['zoom'], option: Option): Option {
 }
 
 // The same style for all units; by default the library sets the larger ones in bold. The first label has the year, and a
-// time of day the date, so that a short span says when it is.
+// time of day the date, so that a short span says when it is. Where the axis begins at an odd time the date is enough.
 function timeLabel(time: number, index: number): string {
   const [month, day, clock] = ['{MMM}', '{d} {MMM}', time % 60000 === 0 ? '{HH}:{mm}' : '{HH}:{mm}:{ss}'];
   const [date, rest] = [new Date(time).toISOString().slice(0, 10), time % 86400000];
   const year = index === 0 ? ' {yyyy}' : '';
-  if (rest !== 0) return index === 0 ? `${day}${year}, ${clock}` : clock;
+  if (rest !== 0 && index === 0) return time % 900000 === 0 ? `${day}${year}, ${clock}` : day + year;
+  if (rest !== 0) return clock;
   if (!date.endsWith('-01')) return day + year;
   return date.endsWith('-01-01') ? '{yyyy}' : month + year;
 }
@@ -381,7 +382,7 @@ export function chart(plan: ChartPlan): Chart {
   }, label));
   take('.svg', 'SVG', 'Save the chart as a drawing', 'image/svg+xml', () => drawn.svg());
   take(plan.thinned ? '_thinned.csv' : '.csv', 'CSV', plan.thinned
-    ? 'Save what is drawn as a table: the extremes of short spans, as the series is longer than a chart can show' : 'Save what is drawn as a table',
+    ? 'Save what is drawn as a table: a part of all values, which are more than a chart can show' : 'Save what is drawn as a table',
   'text/csv', () => drawn.csv());
   if (plan.values) figure.append(valuesTable(plan.title, plan.values));
   renote();

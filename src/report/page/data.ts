@@ -123,6 +123,7 @@ export interface Scenario extends Times {
   number: number;
   values: Maybe[];
   breaks?: number[];
+  thinned?: boolean;
 }
 
 /** The evaluation period or a validation period. */

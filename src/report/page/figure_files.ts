@@ -25,8 +25,11 @@ function inFileName(name: string, length: number): string {
 /** Of setup, section, heading (the section's series, where it has several) and title. */
 export function fileNameOf(figure: Element, title: string, ending: string): string {
   const section = figure.closest('section');
-  let heading: Element | null = figure.closest('.grid') ?? figure;
-  while (heading && heading.tagName !== 'H3') heading = heading.previousElementSibling;
+  let heading: Element | null = null;
+  for (let part: Element | null = figure; part && part !== section && !heading; part = part.parentElement) { // out of grids and what is unfolded
+    heading = part;
+    while (heading && heading.tagName !== 'H3') heading = heading.previousElementSibling;
+  }
   const parts = [inFileName(setupName, 60), section?.id ?? '', inFileName(heading?.textContent ?? '', 40), inFileName(title, 60)];
   return `${parts.filter((part) => part !== '').join('_')}${ending}`;
 }

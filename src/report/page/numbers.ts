@@ -40,6 +40,16 @@ export function bestShare(values: readonly Maybe[], share: number): number[] {
   return places.slice(0, Math.min(places.length, Math.max(10, Math.ceil(places.length * share))));
 }
 
+/** `values` of sets with those parameters, null for a set that was there before, such as the best one that is run again at the end. */
+export function ofDifferentSets(values: readonly Maybe[], parameters: readonly (readonly Maybe[])[]): Maybe[] {
+  const seen = new Set<string>();
+  return values.map((value, place) => {
+    if (value === null) return null;
+    const set = JSON.stringify(parameters.map((column) => column[place]));
+    return seen.has(set) ? null : (seen.add(set), value);
+  });
+}
+
 /** Pearson's correlation of two columns over `places`; null where one of them does not vary. */
 export function correlation(a: readonly Maybe[], b: readonly Maybe[], places: readonly number[]): Maybe {
   const used = places.filter((place) => a[place] != null && b[place] != null);

@@ -62,6 +62,11 @@ test('a table is saved by keyboard, with every value in full, times as ISO, and 
   assert.match(rows[1][0], /^\d{4}-\d\d-\d\dT\d\d:\d\d:\d\d,$/);
   assert.deepEqual([rows.length, rows[2][1], rows[3][3]], [1 + data.series[0].observed.length, '1234567.125,', '-0.00001234,']);
   await keepFiles(page);
+  const pairs = await kept(await page.$('#series .grid .take >> nth=1'));
+  assert.equal(cellsOf(pairs.text).length, 1 + data.series[0].observed.length, 'every pair, though one is drawn of those that nearly coincide');
+  await page.locator('#series details.view').last().evaluate((details) => { details.open = true; });
+  const below = await kept(await page.waitForSelector('#series details.view .grid .take >> nth=1'));
+  assert.ok(below.name.startsWith(`basin_series_${data.series[0].measure.replaceAll(' ', '-')}_`), below.name);
   const sets = cellsOf((await kept(await page.$('#good-sets .take >> nth=1'))).text);
   assert.deepEqual([sets[0].join(''), Number(sets[1].at(-1)).toPrecision(6)], ['Evaluation,a,b,Aggregate', data.best.aggregate.toPrecision(6)], 'the best set comes first');
   await page.context().close();

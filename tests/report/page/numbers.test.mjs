@@ -21,6 +21,7 @@ test('numbers derived from evaluations', () => {
   assert.deepEqual(numbers.bestSoFar([null, ...values]), [null, 5, 5, 3, 3, 3, 3]);
   assert.deepEqual(numbers.placesOfBest([null, ...values]), [null, 1, 1, 3, 3, 5, 5], 'of equals the last');
   assert.deepEqual(numbers.bestShare(values, 0.1), [4, 2, 3, 0, 5], 'of equals the last is the best; ten are taken where there are ten');
+  assert.deepEqual(numbers.ofDifferentSets([3, 1, 1, 1, null], [[1, 2, 2, 3, 2]]), [3, 1, null, 1, null], 'a set that is run again counts once');
   assert.equal(numbers.bestShare(Array.from({ length: 500 }, (_, i) => i), 0.1).length, 50);
   assert.equal(numbers.quantile([1, 2, 3, 4], 0.5), 2.5);
   assert.deepEqual(numbers.durationCurve([1, null, 7, 4]), [[25, 7], [50, 4], [75, 1]]);

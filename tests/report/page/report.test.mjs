@@ -212,7 +212,10 @@ test('observations between the steps of a model, scenarios, axes and further mea
 });
 
 test('20 000 evaluations and 20 years of days are drawn thinned and counted in full', async (context) => {
-  await withReport(sample.stretched(20000, 7305), {}, async (page) => {
+  const data = sample.stretched(20000, 7305);
+  const [series] = data.series;
+  series.breaks = { observed: [2000, 2004, 5000].map((day) => series.period[0] + day * series.step) };
+  await withReport(data, {}, async (page) => {
     const [drawn, size] = await page.evaluate(() => [document.documentElement.dataset.drawn, document.documentElement.outerHTML.length]);
     context.diagnostic(`every chart drawn ${drawn} ms after the page was opened; ${(size / 1e6).toFixed(1)} million characters`);
     assert.deepEqual(await blankCharts(page), []);
@@ -224,6 +227,8 @@ test('20 000 evaluations and 20 years of days are drawn thinned and counted in f
     const [tried, best] = await page.evaluate(() => window.drawnOptions(document.querySelector('#histories figure')).series.map(({ data }) => data));
     assert.ok(tried.length > 500 && tried.length < 18000, `${tried.length} dots`);
     assert.equal(best.at(-1)[0], 20000, 'the line of the best set reaches to the end');
+    const pieces = await page.evaluate(() => [...window.drawingOf(document.querySelector('#series figure'), 390).matchAll(/ d="([^"]*)"/g)].map(([, path]) => path.split('M').length - 1));
+    assert.equal(pieces.filter((count) => count === 4).length, 3, `the observed line, the residuals and their area are interrupted, however narrow the chart: ${pieces}`);
   });
 });
 
@@ -231,11 +236,18 @@ test('a band breaks at its gaps, shows every observed value and says of how many
   const data = sample.dataOf('uncertainty');
   const [band] = data.band;
   Object.assign(band, { gaps: [100], observedGaps: [200, 201], fewestRuns: 7, mostRuns: 9, runs: band.p5.map(() => 9) });
+  band.p95[0] = 8e5;
+  band.start = band.start.replace(/00:00$/, '07:00');
   await withReport(data, {}, async (page) => {
     const [, median, line, dots] = await page.evaluate(() => window.drawnOptions(document.querySelector('#band figure')).series.map(({ data }) => data));
     assert.deepEqual(median.flatMap(([, value], place) => (value === null ? [place] : [])), [100]);
     assert.equal(line.filter(([, value]) => value === null).length, 2);
     assert.deepEqual(dots, [line[201]], 'the value between two gaps');
+    const drawn = () => page.evaluate(() => [/>800000</, /fill-opacity="0.45"/, /, \d\d:\d\d</].map((part) => part.test(window.drawingOf(document.querySelector('#band figure')))));
+    assert.deepEqual(await drawn(), [true, true, false]);
+    await page.locator('#band .canvas').focus();
+    await page.keyboard.press('+');
+    assert.deepEqual(await drawn(), [false, true, false], 'the axis follows what is zoomed in to, and begins with a date');
     const shown = await page.locator('#report').textContent();
     assert.ok(shown.includes('The quantiles are of 7 to 9 runs.'));
     assert.ok(!/best so far|Progress|A wider bound/.test(shown));

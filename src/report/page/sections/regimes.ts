@@ -3,6 +3,7 @@ import { axis, chart, legend, lineEntries, tip, tooltip, type ChartPlan } from '
 import { make, table } from '../dom';
 import { moment, number } from '../format';
 import type { Look } from '../look';
+import { logRange } from '../ticks';
 import type { Extremes, Peak, Ranked, RegimeFit, Views } from '../views';
 import { grid } from './section';
 
@@ -99,7 +100,7 @@ function tailPlan(views: Views, unit: string): ChartPlan {
       legend: legend(look, { data: lineEntries([...kNames]), itemWidth: 34 }),
       grid: { left: 26, right: 16, top: 36, bottom: 28 },
       xAxis: axis(look, { name: 'Time exceeded (%)', min: 70, max: 100, nameGap: 26 }),
-      yAxis: axis(look, { name: unit, log: is('log'), nameGap: 44 }),
+      yAxis: axis(look, { name: unit, nameGap: 44, ...(is('log') ? logRange(kNames.map((name) => tail[name])) : {}) }),
       tooltip: tooltip(look, { trigger: 'axis', formatter: (points: { seriesName: string; value: number[] }[]) =>
         tip(`Exceeded ${number(points[0]!.value[0], 4)} % of the time`, points.map(({ seriesName, value }) => [seriesName, number(value[1])])) }),
       series: kNames.map((name) => ({

@@ -61,7 +61,8 @@ function flowsPlan({ of, residuals: { flows, ofFlows, n } }: Views): ChartPlan {
   const isPositive = flows.every((flow) => flow > 0);
   return {
     title: 'Residuals against the simulated value',
-    note: flows.length < n ? `Of ${count(n)} points that nearly coincide one each is drawn.` : '',
+    note: flows.length < n ? `${count(flows.length)} of ${count(n)} points are drawn: of those that nearly coincide, one.` : '',
+    thinned: flows.length < n,
     height: 320,
     small: true,
     zoom: 'xy',

@@ -3,7 +3,7 @@ import { axis, chart, kFileWidth, legend, lineEntries, tip, tooltip, type Chart,
 import { variableParameters, type Maybe, type Parameter, type ReportData } from '../data';
 import { choice, shorten } from '../dom';
 import { count, number, tick } from '../format';
-import { axisTop, bestShare, bestSoFar, correlation, finite, placeBetweenBounds, quantile, sorted, spaced, thin } from '../numbers';
+import { axisTop, bestShare, bestSoFar, correlation, finite, ofDifferentSets, placeBetweenBounds, quantile, sorted, spaced, thin } from '../numbers';
 import { heatmap } from './heatmap';
 import { grid, paragraph, type Section } from './section';
 
@@ -137,13 +137,13 @@ export function dottySection(data: ReportData, title: string): Section | null {
   };
 }
 
-// If there are few evaluations, more than a tenth of them are shown.
-function nameOfGood(data: ReportData, good: number[]): string {
-  const isShare = finite(data.evaluations.aggregate).length * kGoodShare > good.length - 1;
+// Of few sets more than a tenth are shown.
+function nameOfGood(sets: number, good: number[]): string {
+  const isShare = sets * kGoodShare > good.length - 1;
   return isShare ? `best tenth (${count(good.length)} sets)` : `${count(good.length)} best sets`;
 }
 
-function parallelPlan(data: ReportData, good: number[]): ChartPlan {
+function parallelPlan(data: ReportData, good: number[], name: string): ChartPlan {
   const variable = variableParameters(data);
   const { aggregate, parameters, numbers } = data.evaluations;
   const drawn = spaced(good.length, kLinesDrawn).map((rank) => good[rank]!).reverse(); // the best on top
@@ -154,7 +154,7 @@ function parallelPlan(data: ReportData, good: number[]): ChartPlan {
   const apart = (width: number) => (width - 120) / variable.length;
   const isClose = (width: number) => apart(width) < 110;
   return {
-    title: `Parallel coordinates of the ${nameOfGood(data, good)}`,
+    title: `Parallel coordinates of the ${name}`,
     note: `Each line is a parameter set, the colour its aggregate; the thick line is the best. Drag along an axis to pick lines.${
       good.length > drawn.length ? ` ${count(drawn.length)} of ${count(good.length)} lines are drawn.` : ''}`,
     height: 400,
@@ -195,12 +195,12 @@ function parallelPlan(data: ReportData, good: number[]): ChartPlan {
   };
 }
 
-function correlationPlan(data: ReportData, good: number[]): ChartPlan {
+function correlationPlan(data: ReportData, good: number[], name: string): ChartPlan {
   const names = variableParameters(data).map(({ name }) => name);
   const { parameters } = data.evaluations;
   const matrix = names.map((_, row) => names.map((__, column) =>
     (row === column ? 1 : correlation(parameters[row] ?? [], parameters[column] ?? [], good))));
-  return heatmap(`Correlation of the parameters among the ${nameOfGood(data, good)}`, names, names, matrix, 1,
+  return heatmap(`Correlation of the parameters among the ${name}`, names, names, matrix, 1,
     'Values near \u00b11 say that two parameters make up for each other.');
 }
 
@@ -258,12 +258,15 @@ export function progressSection(data: ReportData): Section | null {
 }
 
 export function goodSetsSection(data: ReportData): Section | null {
-  const good = bestShare(data.evaluations.aggregate, kGoodShare);
+  const { aggregate, parameters } = data.evaluations;
+  const different = ofDifferentSets(aggregate, parameters);
+  const good = bestShare(different, kGoodShare);
+  const name = nameOfGood(finite(different).length, good);
   if (good.length < 3 || variableParameters(data).length < 2) return null;
   return {
     id: 'good-sets',
     title: 'The best sets',
-    content: [chart(parallelPlan(data, good)), chart(correlationPlan(data, good))],
+    content: [chart(parallelPlan(data, good, name)), chart(correlationPlan(data, good, name))],
   };
 }
 

@@ -46,27 +46,31 @@ const lineStyles = (look: Look) => ({
 /** Names that fit a small chart. */
 const short = (simulated: Simulated[]) => simulated.map((one) => ({ ...one, name: one.key }));
 
-function outside(times: number[], period: Series['period']): [number, number][] {
+export function outside(times: number[], period: Series['period']): [number, number][] {
   const [first, last] = [times[0], times[times.length - 1]];
   if (!period || first === undefined || last === undefined) return [];
   return ([[first, period[0]], [period[1], last]] as [number, number][]).filter(([from, to]) => to > from);
 }
 
-// Areas outside the evaluation period, where values do not count.
-function outsidePeriod(look: Look, times: number[], period: Series['period']): object {
+/** Areas outside the evaluation period, where values do not count. */
+export function outsidePeriod(look: Look, times: number[], period: Series['period']): object {
   const areas = outside(times, period);
   return areas.length === 0 ? {} : { markArea: { silent: true, itemStyle: { color: look.rule, opacity: 0.45 }, data: areas.map(([from, to]) => [{ xAxis: from }, { xAxis: to }]) } };
 }
 
-/** A line and the dots on it; both have one entry in the legend. */
+/** A line and the dots on it; both have one entry in the legend. The library's sampling joins lines over gaps. */
 function drawnLine(name: string, line: Line, log: boolean, color: string, more: object): object[] {
   const { dots } = line;
+  const data = pointsOf(line, log);
   return [
-    { name, type: 'line', symbol: 'none', sampling: 'lttb', connectNulls: false, color, data: pointsOf(line, log), ...more },
+    { name, type: 'line', symbol: 'none', sampling: data.some(Number.isNaN) ? undefined : 'lttb', connectNulls: false, color, data, ...more },
     ...(dots.length > 0 ? [{ name, type: 'scatter', symbolSize: 5, itemStyle: { color }, large: dots.length > 3000, ...more,
       data: dots.filter(([, value]) => !log || value > 0) }] : []),
   ];
 }
+
+/** In the legend. */
+const observedEntry = (isPoints: boolean) => (isPoints ? [{ name: 'observed', icon: 'circle' }] : lineEntries(['observed']));
 
 /** Whether zero belongs on the axis: not where it would press the values together, such as water levels. */
 const reachesZero = (columns: Maybe[][]) => {
@@ -80,7 +84,7 @@ function hydrographPlan(data: ReportData, series: Series): ChartPlan {
   const judged = simulated.find(({ key }) => key === 'best') ?? simulated[0];
   const residuals = judged?.values.map((value, place) => {
     const observed = series.observed[place] ?? null;
-    return value === null || observed === null ? null : value - observed;
+    return value === null || observed === null ? null : Number((value - observed).toPrecision(7)); // the digits of the values
   });
   const step = times.slice(1, 1000).reduce((least, time, at) => Math.min(least, time - times[at]!), 86400000);
   const breaks = series.breaks ?? {};
@@ -105,7 +109,7 @@ function hydrographPlan(data: ReportData, series: Series): ChartPlan {
       const ends = { type: 'time', min: times[0], max: times[times.length - 1] };
       const below = { xAxisIndex: 1, yAxisIndex: 1 };
       return {
-        legend: legend(look, { itemWidth: 34, data: [...(isPoints ? ['observed'] : lineEntries(['observed'])), ...lineEntries(simulated.map(({ name }) => name))] }),
+        legend: legend(look, { itemWidth: 34, data: [...observedEntry(isPoints), ...lineEntries(simulated.map(({ name }) => name))] }),
         axisPointer: { link: [{ xAxisIndex: 'all' }], lineStyle: { color: look.muted } },
         grid: [{ left: 72, right: 16, top: 36, height: 262, outerBoundsMode: 'none' }, { left: 72, right: 16, top: 338, height: 86, outerBoundsMode: 'none' }],
         xAxis: [
@@ -167,9 +171,10 @@ function scenarioPlan(data: ReportData, series: Series): ChartPlan {
     note: 'An entry of the legend switches its scenario off and on. Drag across the chart to zoom in, move the slider below to go along.',
     height: 430,
     zoom: 'x',
+    thinned: (series.scenarios ?? []).some(({ thinned }) => thinned),
     switches: [{ key: 'log', label: 'Log' }],
     option: (look, is) => ({
-      legend: legend(look, { itemWidth: 34, data: [...lineEntries(runs.map(({ name }) => name)), ...(isPoints ? ['observed'] : lineEntries(['observed']))] }),
+      legend: legend(look, { itemWidth: 34, data: [...lineEntries(runs.map(({ name }) => name)), ...observedEntry(isPoints)] }),
       grid: { left: 64, right: 16, top: 36, height: 318, outerBoundsMode: 'none' },
       xAxis: axis(look, { type: 'time' }),
       yAxis: axis(look, { name: labelOf(series), nameGap: 48, ...(is('log') ? logRange(all) : { scale: !reachesZero(all) }) }),
@@ -199,7 +204,7 @@ function scenarioPlan(data: ReportData, series: Series): ChartPlan {
     values: () => {
       const longest = runs.reduce((most, run) => (run.times.length > most.length ? run.times : most), [] as number[]);
       return {
-        columns: [{ title: 'Time' }, ...runs.map(({ name }) => ({ title: name, number: true }))],
+        columns: [{ title: 'Time' }, ...runs.map(({ name }) => ({ title: name, number: true, unit: series.unit }))],
         length: longest.length,
         row: (place) => [moment(longest[place]!, step), ...runs.map((run) => number(run.values[nearest(run.times, longest[place]!)]))],
       };
@@ -255,6 +260,11 @@ function scatterPlan(data: ReportData, series: Series): ChartPlan {
         ],
       };
     },
+    csv: () => ({
+      columns: [{ title: 'Time' }, ...['observed', ...simulated.map(({ name }) => name)].map((title) => ({ title, unit: series.unit }))],
+      length: places.length,
+      row: (at) => [moment(times[places[at]!]!), number(observed[at]), ...simulated.map(({ values }) => number(values[places[at]!]))],
+    }),
   };
 }
 
@@ -272,13 +282,14 @@ function durationPlan(data: ReportData, series: Series): ChartPlan {
     { key: 'observed' as const, name: 'observed', values: series.observed },
   ].map((curve) => {
     const points = givenCurve(series, curve.key) ?? durationCurve(places.map((place) => curve.values[place] ?? null));
-    return { ...curve, points: spaced(points.length, kCurvePoints).map((index) => points[index]!) };
+    return { ...curve, points, drawn: spaced(points.length, kCurvePoints).map((index) => points[index]!) };
   });
   const positive = curves.every(({ points }) => points.some(([, value]) => value > 0));
   return {
     title: 'Duration curve',
     height: 340,
     small: true,
+    thinned: series.thinned,
     zoom: 'xy',
     switches: positive ? [{ key: 'log', label: 'Log', on: true }] : [],
     option: (look, is) => ({
@@ -288,9 +299,9 @@ function durationPlan(data: ReportData, series: Series): ChartPlan {
       yAxis: axis(look, { name: labelOf(series), nameGap: 44, ...(is('log') ? logRange(curves.map(({ points }) => points.map(([, value]) => value))) : {}) }),
       tooltip: tooltip(look, { trigger: 'axis', formatter: (points: { seriesName: string; value: number[] }[]) =>
         tip(`Exceeded ${number(points[0]!.value[0], 3)} % of the time`, points.map((point) => [shorten(point.seriesName, 40), number(point.value[1])])) }),
-      series: curves.map(({ key, name, points }) => ({
+      series: curves.map(({ key, name, drawn }) => ({
         name, type: 'line', symbol: 'none', lineStyle: { ...lineStyles(look)[key], width: 1.8 }, color: lineStyles(look)[key].color,
-        data: is('log') ? points.filter(([, value]) => value > 0) : points,
+        data: is('log') ? drawn.filter(([, value]) => value > 0) : drawn,
       })),
     }),
     values: () => ({

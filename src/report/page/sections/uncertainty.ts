@@ -3,9 +3,10 @@ import { axis, chart, legend, lineEntries, timeZoom, tip, tooltip, type ChartPla
 import { timesOf, variableParameters, type Band, type Maybe, type ReportData } from '../data';
 import { count, moment, number, percent } from '../format';
 import { finite, histogram, spaced, type Bin } from '../numbers';
+import { logRange } from '../ticks';
 import { judgements } from './search';
 import { grid, heading, paragraph, type Section } from './section';
-import { labelOf } from './series';
+import { labelOf, outside, outsidePeriod } from './series';
 
 const kBandPoints = 1500; // across the chart: more than it has pixels
 const kFewValues = 150; // observed values up to which each has a dot
@@ -20,7 +21,8 @@ function histogramPlan(name: string, values: Maybe[], wantsLog = false): ChartPl
     small: true,
     option: (look) => ({
       grid: { left: 16, right: 14, top: 12, bottom: 16 },
-      xAxis: axis(look, { log, splitNumber: 4, splitLine: { show: false }, min: bins[0]?.from, max: bins[bins.length - 1]?.to, axisLabel: { showMinLabel: false, showMaxLabel: false } }),
+      xAxis: axis(look, { splitNumber: 4, splitLine: { show: false }, axisLabel: { showMinLabel: false, showMaxLabel: false },
+        ...(log ? logRange([bins.flatMap(({ from, to }) => [from, to])]) : {}), min: bins[0]?.from, max: bins[bins.length - 1]?.to }),
       yAxis: axis(look, { scale: false, splitNumber: 3, minInterval: 1 }),
       tooltip: tooltip(look, { formatter: (bar: { dataIndex: number }) =>
         tip(bounds(bins[bar.dataIndex]!), [['evaluations', count(bins[bar.dataIndex]!.count)]]) }),
@@ -111,7 +113,7 @@ function coverageNote(band: Band): string {
   return `${percent(band.inside)} of ${band.n === null ? 'the' : count(band.n)} observed values lie within the band.`;
 }
 
-function bandPlan(band: Band): ChartPlan {
+function bandPlan(band: Band, period: [number, number] | null): ChartPlan {
   const times = timesOf(band, band.p5.length);
   const step = times.length > 1 ? times[1]! - times[0]! : 86400000;
   const positive = (value: Maybe | undefined) => (value != null && value > 0 ? value : null);
@@ -123,23 +125,24 @@ function bandPlan(band: Band): ChartPlan {
   const few = finite(band.observed).length <= kFewValues;
   return {
     title: 'The 5 to 95 % band of the simulated values, and the observed',
-    note: `${coverageNote(band)}${runsNote(band)}${band.thinned ? ' Of so many times the extremes of short spans are drawn.' : ''} Drag across the chart to zoom in.`,
+    note: `${coverageNote(band)}${runsNote(band)}${band.thinned ? ' Of so many times the extremes of short spans are drawn.' : ''}${outside(times, period).length > 0 ? ' Shaded: outside the evaluation period.' : ''} Drag across the chart to zoom in.`,
     height: 440,
     zoom: 'x',
+    thinned: band.thinned,
     switches: [{ key: 'log', label: 'Log' }],
     option: (look, is) => {
       const scaled = (value: Maybe | undefined) => (is('log') ? positive(value) : value ?? null);
       const shown = is('log') ? { ...band, p5: band.p5.map(positive), p95: band.p95.map(positive) } : band;
       const points = (places: Place[], values: Maybe[]) => places.map((place, index) =>
         (place === null ? [times[places[index + 1]!]!, null] : [times[place]!, scaled(values[place])]));
-      const lines = { type: 'line', symbol: 'none', connectNulls: false, sampling: 'lttb' };
+      const lines = { type: 'line', symbol: 'none', connectNulls: false }; // not sampled by the library, which joins lines over gaps
       const [first, last] = [times[0]!, times[times.length - 1]!];
       return {
         legend: legend(look, { data: ['5 to 95 %', ...lineEntries(['median', 'observed'])], itemWidth: 34 }),
         grid: { left: 72, right: 16, top: 36, bottom: 72 },
         xAxis: [axis(look, { type: 'time', min: first, max: last })],
         yAxis: axis(look, { name: labelOf(band), log: is('log'), nameGap: 48, ...(is('log') ? {} : { scale: false }) }),
-        dataZoom: timeZoom(look, [0], 'none', (time) => moment(time, step)),
+        dataZoom: timeZoom(look, [0], 'filter', (time) => moment(time, step)),
         tooltip: tooltip(look, { trigger: 'axis', formatter: (found: { axisValue: number }[]) => {
           const place = nearest(times, found[0]!.axisValue);
           return tip(moment(times[place]!, step), [['observed', number(band.observed[place])], ['median', number(band.p50[place])],
@@ -149,10 +152,10 @@ function bandPlan(band: Band): ChartPlan {
         series: [
           {
             name: '5 to 95 %', type: 'custom', color: look.band, clip: true, tooltip: { show: false },
-            // One item draws the whole band; its two corners give the axes their extent.
-            data: [[first, finite(shown.p5).reduce((a, b) => Math.min(a, b), Infinity)], [last, finite(shown.p95).reduce((a, b) => Math.max(a, b), -Infinity)]],
-            renderItem: (info: { dataIndex: number; coordSys: { x: number; width: number } }, api: CustomApi & { size: (of: number[]) => number[] }) => {
-              if (info.dataIndex > 0) return null;
+            // The first place in view draws the whole band; all of them give the value axis its extent.
+            encode: { x: 0, y: [1, 2] }, data: times.map((time, place) => [time, shown.p5[place], shown.p95[place]]), progressive: 0,
+            renderItem: (info: { dataIndexInside: number; coordSys: { x: number; width: number } }, api: CustomApi & { size: (of: number[]) => number[] }) => {
+              if (info.dataIndexInside > 0) return null;
               const origin = api.coord([first, api.value(1)])[0]!;
               const scale = api.size([1, 0])[0]!;
               const from = Math.max(0, times.findIndex((time) => origin + (time - first) * scale >= info.coordSys.x) - 1);
@@ -162,7 +165,7 @@ function bandPlan(band: Band): ChartPlan {
             },
           },
           { ...lines, name: 'median', data: points(median, band.p50), color: look.best, lineStyle: { color: look.best, width: 1.3 } },
-          { ...lines, name: 'observed', data: points(observed, band.observed), color: look.observed, lineStyle: { color: look.observed, width: 1.1 }, z: 4 },
+          { ...lines, name: 'observed', data: points(observed, band.observed), color: look.observed, lineStyle: { color: look.observed, width: 1.1 }, z: 4, ...outsidePeriod(look, times, period) },
           // Values without a neighbour have no line, and a line through a few hides where they are.
           { name: 'observed', type: 'scatter', data: points(few ? observed : alone, band.observed), symbolSize: 5, itemStyle: { color: look.observed }, z: 4 },
         ],
@@ -192,7 +195,8 @@ function nearest(times: number[], time: number): number {
 export function bandSection(data: ReportData): Section | null {
   const shown = data.band.filter(({ p5, p95 }) => finite(p5).length > 0 && finite(p95).length > 0);
   if (shown.length === 0) return null;
-  return { id: 'band', title: 'Uncertainty band', content: shown.flatMap((band) => [heading(band.measure), chart(bandPlan(band))]) };
+  const period = data.run.period?.map((time) => Date.parse(`${time.replace(' ', 'T')}Z`)) as [number, number] | undefined ?? null;
+  return { id: 'band', title: 'Uncertainty band', content: shown.flatMap((band) => [heading(band.measure), chart(bandPlan(band, period))]) };
 }
 
 export function distributionSection(data: ReportData): Section | null {
