@@ -39,7 +39,8 @@ struct ReportedRun {
   std::string periodStart;
   std::string periodEnd;
   std::optional<int> seed;
-  std::vector<std::string> notes;  ///< whole sentences on what is missing or old
+  std::vector<std::string> closingWarnings;  ///< warnings of the run that its closing lines have, too
+  std::vector<std::string> notes;            ///< whole sentences on what is missing or old
 };
 
 struct ReportedParameter {
@@ -135,6 +136,7 @@ struct ReportedSensitivity {
   std::vector<double> composite;
   bool isOfObservations = false;  ///< the composite, rather than of the objective functions or output measures
   std::vector<std::string> ranking;
+  bool hasBetterFit = false;     ///< another set fits better than that of the analysis
   std::vector<int> ofOtherSets;  ///< evaluations that are left out, as the setup has other sets for them
   std::optional<ReportedCovariance> covariance;
 };

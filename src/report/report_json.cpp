@@ -77,7 +77,7 @@ void writeRun(JsonWriter& json, const ReportData& data) {
   }
   const auto isNamed = [](const std::string& name) { return !name.empty(); };
   if (std::any_of(data.runNames.begin(), data.runNames.end(), isNamed)) json.member("runNames", data.runNames);
-  json.member("notes", run.notes).endObject();
+  json.member("closingWarnings", run.closingWarnings).member("notes", run.notes).endObject();
 }
 
 void writeParameters(JsonWriter& json, const ReportData& data) {
@@ -325,7 +325,7 @@ void writeSensitivity(JsonWriter& json, const ReportedSensitivity& sensitivity) 
   json.key("derivatives").rows(sensitivity.derivatives, Digits::drawn);
   json.key("dimensionless").rows(sensitivity.dimensionless, Digits::drawn);
   json.key("composite").numbers(sensitivity.composite, Digits::drawn).member("ranking", sensitivity.ranking);
-  json.member("isOfObservations", sensitivity.isOfObservations);
+  json.member("isOfObservations", sensitivity.isOfObservations).member("hasBetterFit", sensitivity.hasBetterFit);
   json.key("covariance");
   if (sensitivity.covariance) {
     const ReportedCovariance& covariance = *sensitivity.covariance;

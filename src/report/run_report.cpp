@@ -168,7 +168,7 @@ void ReportBuilder::addRun() {
   for (const std::string& text : record.warnings) {
     const std::string warning = "Warning: " + text;
     const bool isInSummary = std::find(data_.summary.begin(), data_.summary.end(), warning) != data_.summary.end();
-    if (!isInSummary) note(warning);
+    (isInSummary ? run.closingWarnings : run.notes).push_back(warning);
   }
   if (const int more = record.warningCount - static_cast<int>(record.warnings.size()); more > 0) {
     note(fmt::format("{} more of {} warnings are in {}.log.", more, record.warningCount, config_.setupName));

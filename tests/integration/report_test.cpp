@@ -115,7 +115,9 @@ TEST(Report, OfASensitivityAnalysisLeavesOutWhatIsOfOtherSetsThanThoseOfTheSetup
   folder.writeSetup({.option = 1});
   ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0);
   const char* const ofRun = R"("derivatives":[[-0.8166733,-0.8166733],[-0.4077077,-0.4077077]])";
-  EXPECT_THAT(reportData(folder), HasSubstr(ofRun));
+  EXPECT_THAT(reportData(folder),
+              AllOf(HasSubstr(ofRun), HasSubstr(R"("hasBetterFit":true)"),
+                    HasSubstr(R"("closingWarnings":["Warning: 2 evaluations fit better than the base)")));
   // Now there is no step of a upwards, and the sets of b have other numbers.
   folder.editSetup(
       "TqSEKdxListItemCount = 0\n    [/INTERNAL_CONSTRAINTS]",

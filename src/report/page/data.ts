@@ -26,6 +26,7 @@ export interface Run {
   period: [string, string] | null;
   seed: number | null;
   runNames?: string[]; // of the evaluations, from the first on; empty where one has none
+  closingWarnings?: string[]; // of the run, which the summary has, too
   notes: string[];
 }
 
@@ -199,6 +200,7 @@ export interface Sensitivity {
   derivatives: Maybe[][]; // one row per parameter, one column per output
   dimensionless: Maybe[][];
   composite: Maybe[];
+  hasBetterFit?: boolean; // another set fits better than that of the analysis
   isOfObservations?: boolean; // the composite, rather than of the objective functions or output measures
   ranking: string[];
   covariance: Covariance | null;

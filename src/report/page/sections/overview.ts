@@ -79,7 +79,7 @@ function findings(data: ReportData): Finding[] {
     found.push({ kind: 'warning', text: `${counted(run.failed, 'evaluation')} failed (${percent(run.failed / run.evaluations, 2)}).` });
   }
   return [...found.filter((finding): finding is Finding => finding !== null),
-    ...run.notes.map((text): Finding => ({ kind: 'warning', text }))];
+    ...[...run.closingWarnings ?? [], ...run.notes].map((text): Finding => ({ kind: 'warning', text }))];
 }
 
 function tile(label: string, value: string, more?: string | null): HTMLElement {

@@ -19,7 +19,7 @@ export function viewsOf({ measure, views }: Series, label: string): Node[] {
   return [
     folded('Seasons and years', () => [
       fitsTable(views, measure),
-      make('p', { class: 'note' }, 'Over all times of the hydrograph. Efficiencies need 10 values.'),
+      make('p', { class: 'note' }, 'Over the evaluation period. Efficiencies need 10 values.'),
     ]),
     folded('Low flows and floods', () => extremesView(views, label)),
     ...(peaks && peaks.length > 0 ? [folded('Largest peaks', () => [peaksTable(views, peaks, measure)])] : []),
