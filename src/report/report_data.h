@@ -77,6 +77,7 @@ struct ReportedObjective {
 struct ReportedComparison {
   std::string measure;
   RunRecord::Compared items;
+  std::string counted;                         ///< which observations count and how; empty: all, alike
   MeasurePairs pairs;                          ///< of the best evaluation, else of the first successful run
   int number = 0;                              ///< of that evaluation
   std::optional<ValueSummary> simulatedFirst;  ///< by the first successful run, if `pairs` are those of the best

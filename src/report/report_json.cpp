@@ -264,7 +264,8 @@ void writeSeries(JsonWriter& json, const ReportData& data) {
     writeDrawnLines(json, whole);
     writeScenarios(json, data, series.measure);
     if (place < data.above.size() && data.above[place]) writeAbove(json, *data.above[place]);
-    writeHydrographViews(json, series, dateOfSecond(data.periodFirst)[date_field::kMonth]);
+    const bool hasHoles = place < data.seriesLabels.size() && data.seriesLabels[place].hasHoles;
+    writeHydrographViews(json, series, dateOfSecond(data.periodFirst)[date_field::kMonth], !hasHoles);
     json.endObject();
   }
   json.endArray();
@@ -280,6 +281,7 @@ void writeComparisons(JsonWriter& json, const ReportData& data) {
     const MeasurePairs& pairs = comparison.pairs;
     json.beginObject().member("measure", comparison.measure).member("evaluation", comparison.number);
     json.member("simulatedItem", comparison.items.simulated).member("observedItem", comparison.items.observed);
+    json.optionalMember("counted", comparison.counted);
     json.member("pairs", pairs.count).member("missing", pairs.missingCount);
     json.key("span").beginArray().integer(epochMilliseconds(pairs.first)).integer(epochMilliseconds(pairs.last));
     json.endArray();

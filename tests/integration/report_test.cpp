@@ -135,7 +135,12 @@ TEST(Report, OfASensitivityAnalysisLeavesOutWhatIsOfOtherSetsThanThoseOfTheSetup
   folder.write("basin_Sensitivity.dat", results.erase(best, results.find("\n4\t") - best));
   EXPECT_EQ(makeReport(folder).exitCode, 0);
   EXPECT_THAT(reportData(folder),
-              HasSubstr("best are those of evaluation 3, which the result file does not hold; the "));
+              AllOf(HasSubstr("\"peaks\""), HasSubstr("best are those of evaluation 3, which the result "
+                                                      "file does not hold; the ")));
+  folder.editSetup("Statistic_Type", "Months = 1, 2\n        Statistic_Type");
+  EXPECT_EQ(makeReport(folder).exitCode, 0);
+  EXPECT_THAT(reportData(folder),
+              AllOf(Not(HasSubstr("\"peaks\"")), HasSubstr(R"("counted":"Observations: Months = 1, 2.")")));
 }
 
 // Results without the files that this version adds: the report has all that the others hold.

@@ -66,6 +66,7 @@ export interface Comparison {
   evaluation: number; // whose pairs these are
   simulatedItem: string;
   observedItem: string;
+  counted?: string | null; // which observations count and how; null: all, alike
   pairs: number;
   missing: number; // observations without a simulated value
   span: [number, number];

@@ -26,7 +26,7 @@ export function peaksTable(views: Views, peaks: Peak[], measure: string): HTMLEl
       { title: 'Difference (%)', number: true, hint: 'positive: the simulation is too large' },
       { title: isDaily ? 'Later by (days)' : 'Later by (h)', number: true, hint: 'negative: the simulation is too early' },
     ], peaks.map(row), `Peaks of ${measure}`),
-    make('p', { class: 'note' }, 'The largest observed values with no larger one within 7 days, and the largest simulated value within 3 days of each.'));
+    make('p', { class: 'note' }, 'The largest observed values with no larger one within 7 days and none missing beside them, and the largest simulated value of the pairs within 3 days of each.'));
 }
 
 const kNames = ['observed', 'simulated'] as const;
