@@ -1,6 +1,7 @@
 // The data that the program writes into the page. Missing, NaN and infinite numbers are null. What a run does not have
 // is absent or empty: the page shows sections only for what exists.
 
+import { shorten } from './dom';
 import type { SeriesAbove, Views } from './views';
 
 export type Maybe = number | null;
@@ -258,6 +259,11 @@ export function readReportData(text: string): ReportData {
 export function variableParameters(data: ReportData): Parameter[] {
   return data.parameters.filter((parameter) => parameter.kind === 'variable');
 }
+
+export type Unit = string | null | undefined;
+
+/** "Residual [m3/s]". */
+export const withUnit = (text: string, unit: Unit): string => (unit ? `${text} [${shorten(unit, 20)}]` : text);
 
 /** Milliseconds since 1970 of `length` values. */
 export function timesOf(times: Times, length: number): number[] {

@@ -40,6 +40,26 @@ export function bestShare(values: readonly Maybe[], share: number): number[] {
   return places.slice(0, Math.min(places.length, Math.max(10, Math.ceil(places.length * share))));
 }
 
+/** The aggregates without those of sets that an earlier evaluation has already run, with the same result. */
+export function withoutRepeats(aggregate: readonly Maybe[], parameters: readonly (readonly Maybe[])[]): Maybe[] {
+  const first = new Map<number, number>(); // places, by the aggregate
+  const seen = new Set<string>();
+  const keyOf = (place: number) => JSON.stringify([aggregate[place], ...parameters.map((column) => column[place])]);
+  return aggregate.map((value, place) => {
+    if (value === null) return null;
+    const other = first.get(value);
+    if (other === undefined) {
+      first.set(value, place);
+      return value;
+    }
+    seen.add(keyOf(other));
+    const key = keyOf(place);
+    if (seen.has(key)) return null;
+    seen.add(key);
+    return value;
+  });
+}
+
 /** Pearson's correlation of two columns over `places`; null where one of them does not vary. */
 export function correlation(a: readonly Maybe[], b: readonly Maybe[], places: readonly number[]): Maybe {
   const used = places.filter((place) => a[place] != null && b[place] != null);

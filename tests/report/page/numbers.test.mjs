@@ -18,6 +18,7 @@ const format = await load('format.ts');
 
 test('numbers derived from evaluations', () => {
   const values = [5, null, 3, 4, 3, 9];
+  assert.deepEqual(numbers.withoutRepeats([2, 1, null, 1, 1], [[5, 6, 6, 7, 6]]), [2, 1, null, 1, null]);
   assert.deepEqual(numbers.bestSoFar([null, ...values]), [null, 5, 5, 3, 3, 3, 3]);
   assert.deepEqual(numbers.placesOfBest([null, ...values]), [null, 1, 1, 3, 3, 5, 5], 'of equals the last');
   assert.deepEqual(numbers.bestShare(values, 0.1), [4, 2, 3, 0, 5], 'of equals the last is the best; ten are taken where there are ten');

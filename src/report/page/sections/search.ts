@@ -3,7 +3,7 @@ import { axis, chart, kFileWidth, legend, lineEntries, tip, tooltip, type Chart,
 import { variableParameters, type Maybe, type Parameter, type ReportData } from '../data';
 import { choice, shorten } from '../dom';
 import { count, number, tick } from '../format';
-import { axisTop, bestShare, bestSoFar, correlation, finite, placeBetweenBounds, quantile, sorted, spaced, thin } from '../numbers';
+import { axisTop, bestShare, bestSoFar, correlation, finite, placeBetweenBounds, quantile, sorted, spaced, thin, withoutRepeats } from '../numbers';
 import { heatmap } from './heatmap';
 import { grid, paragraph, type Section } from './section';
 
@@ -258,7 +258,7 @@ export function progressSection(data: ReportData): Section | null {
 }
 
 export function goodSetsSection(data: ReportData): Section | null {
-  const good = bestShare(data.evaluations.aggregate, kGoodShare);
+  const good = bestShare(withoutRepeats(data.evaluations.aggregate, data.evaluations.parameters), kGoodShare);
   if (good.length < 3 || variableParameters(data).length < 2) return null;
   return {
     id: 'good-sets',
