@@ -117,38 +117,32 @@ DurationTail durationTail(const ShownPairs& pairs) {
   return tail;
 }
 
-std::vector<ShownPeak> largestPeaks(const ShownSeries& series) {
-  std::vector<std::size_t> places;  // of observations, in the order of time
-  for (std::size_t i = 0; i < series.observed.size(); ++i) {
-    if (std::isfinite(series.observed[i])) places.push_back(i);
-  }
-  std::vector<std::size_t> falling(places.size());
+std::vector<ShownPeak> largestPeaks(const ShownPairs& pairs) {
+  const std::vector<std::int64_t>& seconds = pairs.seconds;
+  const std::int64_t step = usualStep(pairs);
+  std::vector<std::size_t> falling(seconds.size());
   std::iota(falling.begin(), falling.end(), 0);
-  std::stable_sort(falling.begin(), falling.end(), [&](std::size_t a, std::size_t b) {
-    return series.observed[places[a]] > series.observed[places[b]];
-  });
-  const std::vector<float>& simulated = judgedValues(series);
+  std::stable_sort(falling.begin(), falling.end(),
+                   [&](std::size_t a, std::size_t b) { return pairs.observed[a] > pairs.observed[b]; });
+  const auto isUsual = [&](std::size_t later) { return 2 * (seconds[later] - seconds[later - 1]) <= 3 * step; };
   std::vector<ShownPeak> peaks;
   std::set<std::int64_t> higher;  // times of larger values, and of equal ones before
   for (const std::size_t at : falling) {
     if (peaks.size() == kPeakCount) break;
-    const std::int64_t second = series.seconds[places[at]];
-    const float value = series.observed[places[at]];
+    const std::int64_t second = seconds[at];
+    const float value = pairs.observed[at];
     const auto near = higher.lower_bound(second - kPeakDistance);
     const bool isExceeded = near != higher.end() && *near <= second + kPeakDistance;
     higher.insert(second);
-    if (isExceeded || at == 0 || second - series.seconds[places[at - 1]] > kPeakDistance) continue;
-    bool falls = false;
-    for (std::size_t next = at + 1; next < places.size() && !falls; ++next) {
-      if (series.seconds[places[next]] > second + kPeakDistance) break;
-      falls = series.observed[places[next]] < value;
-    }
-    if (!falls) continue;
+    if (isExceeded || at == 0 || !isUsual(at)) continue;
+    std::size_t next = at + 1;  // the first lower one, behind equal ones
+    while (next < seconds.size() && isUsual(next) && pairs.observed[next] == value) ++next;
+    if (next == seconds.size() || !isUsual(next)) continue;
     ShownPeak peak{second, value, kNaN, kNaN, kNaN};
-    const auto begin = std::lower_bound(series.seconds.begin(), series.seconds.end(), second - kPeakWindow);
-    for (auto time = begin; time != series.seconds.end() && *time <= second + kPeakWindow; ++time) {
-      const float candidate = simulated[static_cast<std::size_t>(time - series.seconds.begin())];
-      if (!std::isfinite(candidate) || candidate <= peak.simulated) continue;
+    const auto begin = std::lower_bound(seconds.begin(), seconds.end(), second - kPeakWindow);
+    for (auto time = begin; time != seconds.end() && *time <= second + kPeakWindow; ++time) {
+      const float candidate = pairs.simulated[static_cast<std::size_t>(time - seconds.begin())];
+      if (candidate <= peak.simulated) continue;
       peak.simulated = candidate;
       peak.hoursLater = static_cast<double>(*time - second) / 3600.0;
     }

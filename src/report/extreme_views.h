@@ -43,13 +43,13 @@ DurationTail durationTail(const ShownPairs& pairs);
 struct ShownPeak {
   std::int64_t second = 0;
   double observed = 0.0;
-  double simulated = 0.0;   ///< the largest value at most 3 days from the observed peak; NaN if there is none
+  double simulated = 0.0;   ///< the largest one of a pair at most 3 days from the observed peak
   double percent = 0.0;     ///< by how much it is larger, of the observed value
   double hoursLater = 0.0;  ///< its time less that of the observed peak
 };
 
-/// The 10 largest observed values that no observed value within 7 days before and after exceeds, the largest first. Of
-/// equal ones the first counts. An end of the observations, or of a gap of 7 days, is no peak.
-std::vector<ShownPeak> largestPeaks(const ShownSeries& series);
+/// The 10 largest observed values that no other within 7 days before and after exceeds, the largest first. Of equal
+/// ones the first counts. A value beside an end or a gap of the pairs, such as a missing one, is no peak.
+std::vector<ShownPeak> largestPeaks(const ShownPairs& pairs);
 
 }  // namespace mirevo

@@ -91,7 +91,7 @@ void writeResiduals(JsonWriter& json, const ResidualViews& residuals) {
 
 }  // namespace
 
-void writeHydrographViews(JsonWriter& json, const ShownSeries& series, int firstMonth) {
+void writeHydrographViews(JsonWriter& json, const ShownSeries& series, int firstMonth, bool hasPeaks) {
   const ShownPairs pairs = shownPairs(series);
   if (pairs.seconds.empty()) return;
   json.key("views").beginObject().member("of", &judgedValues(series) == &series.best ? "best" : "initial");
@@ -99,7 +99,7 @@ void writeHydrographViews(JsonWriter& json, const ShownSeries& series, int first
   writeFits(json, "seasons", seasonFits(pairs));
   writeFits(json, "years", yearFits(pairs, firstMonth));
   writeExtremes(json, pairs, firstMonth);
-  if (isAtLeastDaily(pairs)) writePeaks(json, largestPeaks(series));
+  if (hasPeaks && isAtLeastDaily(pairs)) writePeaks(json, largestPeaks(pairs));
   writeResiduals(json, residualViews(pairs));
   json.endObject();
 }

@@ -187,6 +187,7 @@ std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, 
   }
   reported.composite = config.objectives.empty() ? found.measures.composite : found.objectives.composite;
   for (const std::size_t i : found.ranking) reported.ranking.push_back(space.names[i]);
+  reported.hasBetterFit = !betterFitText(found.results).empty();
   reported.ofOtherSets = evaluator.ofOtherSets();
   return reported;
 }
@@ -206,6 +207,7 @@ std::string takeSensitivities(const std::string& filePrefix, ReportedSensitivity
   ReportedSensitivity found;
   found.parameters = sensitivity.parameters;
   found.outputs = sensitivity.outputs;
+  found.hasBetterFit = sensitivity.hasBetterFit;
   auto row = table.rows.begin();
   std::size_t observed = 0;  // parameters with a row over the observations
   for (const std::string& parameter : found.parameters) {

@@ -39,7 +39,8 @@ struct ReportedRun {
   std::string periodStart;
   std::string periodEnd;
   std::optional<int> seed;
-  std::vector<std::string> notes;  ///< whole sentences on what is missing or old
+  std::vector<std::string> closingWarnings;  ///< warnings of the run that its closing lines have, too
+  std::vector<std::string> notes;            ///< whole sentences on what is missing or old
 };
 
 struct ReportedParameter {
@@ -76,6 +77,7 @@ struct ReportedObjective {
 struct ReportedComparison {
   std::string measure;
   RunRecord::Compared items;
+  std::string counted;                         ///< which observations count and how; empty: all, alike
   MeasurePairs pairs;                          ///< of the best evaluation, else of the first successful run
   int number = 0;                              ///< of that evaluation
   std::optional<ValueSummary> simulatedFirst;  ///< by the first successful run, if `pairs` are those of the best
@@ -135,6 +137,7 @@ struct ReportedSensitivity {
   std::vector<double> composite;
   bool isOfObservations = false;  ///< the composite, rather than of the objective functions or output measures
   std::vector<std::string> ranking;
+  bool hasBetterFit = false;     ///< another set fits better than that of the analysis
   std::vector<int> ofOtherSets;  ///< evaluations that are left out, as the setup has other sets for them
   std::optional<ReportedCovariance> covariance;
 };

@@ -77,7 +77,7 @@ void writeRun(JsonWriter& json, const ReportData& data) {
   }
   const auto isNamed = [](const std::string& name) { return !name.empty(); };
   if (std::any_of(data.runNames.begin(), data.runNames.end(), isNamed)) json.member("runNames", data.runNames);
-  json.member("notes", run.notes).endObject();
+  json.member("closingWarnings", run.closingWarnings).member("notes", run.notes).endObject();
 }
 
 void writeParameters(JsonWriter& json, const ReportData& data) {
@@ -266,7 +266,8 @@ void writeSeries(JsonWriter& json, const ReportData& data) {
     writeDrawnLines(json, whole);
     writeScenarios(json, data, series.measure);
     if (place < data.above.size() && data.above[place]) writeAbove(json, *data.above[place]);
-    writeHydrographViews(json, series, dateOfSecond(data.periodFirst)[date_field::kMonth]);
+    const bool hasHoles = place < data.seriesLabels.size() && data.seriesLabels[place].hasHoles;
+    writeHydrographViews(json, series, dateOfSecond(data.periodFirst)[date_field::kMonth], !hasHoles);
     json.endObject();
   }
   json.endArray();
@@ -282,6 +283,7 @@ void writeComparisons(JsonWriter& json, const ReportData& data) {
     const MeasurePairs& pairs = comparison.pairs;
     json.beginObject().member("measure", comparison.measure).member("evaluation", comparison.number);
     json.member("simulatedItem", comparison.items.simulated).member("observedItem", comparison.items.observed);
+    json.optionalMember("counted", comparison.counted);
     json.member("pairs", pairs.count).member("missing", pairs.missingCount);
     json.key("span").beginArray().integer(epochMilliseconds(pairs.first)).integer(epochMilliseconds(pairs.last));
     json.endArray();
@@ -327,7 +329,7 @@ void writeSensitivity(JsonWriter& json, const ReportedSensitivity& sensitivity) 
   json.key("derivatives").rows(sensitivity.derivatives, Digits::drawn);
   json.key("dimensionless").rows(sensitivity.dimensionless, Digits::drawn);
   json.key("composite").numbers(sensitivity.composite, Digits::drawn).member("ranking", sensitivity.ranking);
-  json.member("isOfObservations", sensitivity.isOfObservations);
+  json.member("isOfObservations", sensitivity.isOfObservations).member("hasBetterFit", sensitivity.hasBetterFit);
   json.key("covariance");
   if (sensitivity.covariance) {
     const ReportedCovariance& covariance = *sensitivity.covariance;

@@ -22,8 +22,11 @@
 #include "common/version.h"
 #include "evaluation/chosen_evaluations.h"
 #include "evaluation/run_comparison.h"
+#include "measures/observation_selection.h"
+#include "measures/observation_weights.h"
 #include "measures/period_series.h"
 #include "measures/statistics.h"
+#include "measures/time_match.h"
 #include "parameters/parameter_model.h"
 #include "report/page/page_template.h"
 #include "report/report_analyses.h"
@@ -168,7 +171,7 @@ void ReportBuilder::addRun() {
   for (const std::string& text : record.warnings) {
     const std::string warning = "Warning: " + text;
     const bool isInSummary = std::find(data_.summary.begin(), data_.summary.end(), warning) != data_.summary.end();
-    if (!isInSummary) note(warning);
+    (isInSummary ? run.closingWarnings : run.notes).push_back(warning);
   }
   if (const int more = record.warningCount - static_cast<int>(record.warnings.size()); more > 0) {
     note(fmt::format("{} more of {} warnings are in {}.log.", more, record.warningCount, config_.setupName));
@@ -265,6 +268,20 @@ void ReportBuilder::addMeasures() {
   }
 }
 
+/// For people: which observations of a measure count, how much each does, and what they are compared with.
+std::string countedText(const OutputMeasure& measure, const EvaluationPeriod& period) {
+  const std::string selection = describeSelection(measure.selection);
+  std::string text = selection.empty() ? "" : "Observations: " + selection + ". ";
+  if (period.warmUpDays > 0.0) {
+    text += fmt::format("Observations count from {} on, after a warm-up. ", formatDate(endOfWarmUp(period)));
+  }
+  const std::string weighting = describeWeighting(measure.weighting);
+  if (!weighting.empty()) text += fmt::format("Weights and codes: {}. ", weighting.substr(2));  // without ", "
+  const std::string matching = describeMatching(measure.timeMatch);
+  if (!matching.empty()) text += fmt::format("Compared with {}. ", matching);
+  return std::string(trimTrailing(text));
+}
+
 /// Of the best evaluation its own pairs or those of another model run of its set, as a search ends with one.
 void ReportBuilder::addComparisons() {
   const PairsByNumber all = pairsOfRuns();
@@ -279,6 +296,7 @@ void ReportBuilder::addComparisons() {
     if (pairs.measure >= config_.measures.size() || pairs.count == 0) continue;
     ReportedComparison& comparison = data_.comparisons.emplace_back();
     comparison.measure = config_.measures[pairs.measure].name;
+    comparison.counted = countedText(config_.measures[pairs.measure], config_.period);
     comparison.pairs = pairs;
     comparison.number = shown->first;
     const auto items = sources_.record.compared.find(static_cast<int>(pairs.measure) + 1);

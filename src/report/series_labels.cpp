@@ -13,6 +13,7 @@ std::vector<SeriesLabel> seriesLabels(std::span<const OutputMeasure> measures, s
   std::vector<SeriesLabel> labels(shown.size());
   std::map<std::string, std::vector<std::size_t>> unsaid;  // places in the list, by the file that may say it
   for (std::size_t place = 0; place < shown.size(); ++place) {
+    labels[place].hasHoles = measures[shown[place]].selection.leavesHoles();
     for (const OutputMeasure& other : measures) {
       const bool isOfPair =
           other.interfaceType == InterfaceType::timeSeries && isSamePair(other, measures[shown[place]]);

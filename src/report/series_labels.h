@@ -11,8 +11,9 @@ namespace mirevo {
 
 /// What an axis says of a pair of series.
 struct SeriesLabel {
-  std::string quantity;  ///< as the setup names it, else the observed item; empty where neither does
-  std::string unit;      ///< as the setup says, else the observed file; may be empty
+  std::string quantity;   ///< as the setup names it, else the observed item; empty where neither does
+  std::string unit;       ///< as the setup says, else the observed file; may be empty
+  bool hasHoles = false;  ///< observations are left out for their months or values
 };
 
 /// The labels of the pairs of these measures, 0-based. Of several measures that compare a pair the first that says

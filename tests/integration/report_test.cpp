@@ -115,7 +115,9 @@ TEST(Report, OfASensitivityAnalysisLeavesOutWhatIsOfOtherSetsThanThoseOfTheSetup
   folder.writeSetup({.option = 1});
   ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0);
   const char* const ofRun = R"("derivatives":[[-0.8166733,-0.8166733],[-0.4077077,-0.4077077]])";
-  EXPECT_THAT(reportData(folder), HasSubstr(ofRun));
+  EXPECT_THAT(reportData(folder),
+              AllOf(HasSubstr(ofRun), HasSubstr(R"("hasBetterFit":true)"),
+                    HasSubstr(R"("closingWarnings":["Warning: 2 evaluations fit better than the base)")));
   // Now there is no step of a upwards, and the sets of b have other numbers.
   folder.editSetup(
       "TqSEKdxListItemCount = 0\n    [/INTERNAL_CONSTRAINTS]",
@@ -133,7 +135,12 @@ TEST(Report, OfASensitivityAnalysisLeavesOutWhatIsOfOtherSetsThanThoseOfTheSetup
   folder.write("basin_Sensitivity.dat", results.erase(best, results.find("\n4\t") - best));
   EXPECT_EQ(makeReport(folder).exitCode, 0);
   EXPECT_THAT(reportData(folder),
-              HasSubstr("best are those of evaluation 3, which the result file does not hold; the "));
+              AllOf(HasSubstr("\"peaks\""), HasSubstr("best are those of evaluation 3, which the result "
+                                                      "file does not hold; the ")));
+  folder.editSetup("Statistic_Type", "Months = 1, 2\n        Statistic_Type");
+  EXPECT_EQ(makeReport(folder).exitCode, 0);
+  EXPECT_THAT(reportData(folder),
+              AllOf(Not(HasSubstr("\"peaks\"")), HasSubstr(R"("counted":"Observations: Months = 1, 2.")")));
 }
 
 // Results without the files that this version adds: the report has all that the others hold.

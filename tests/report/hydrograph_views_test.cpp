@@ -91,10 +91,13 @@ TEST(HydrographViews, PeaksAreAWeekApartAndComparedWithTheLargestSimulatedValueN
   observed[10] = observed[11] = 8.0F;  // the first of equal ones
   observed[16] = 7.0F;                 // within 7 days
   observed[24] = 5.0F;
+  observed[34] = 20.0F;  // beside a missing one
+  observed[35] = NAN;
   simulated[12] = 6.0F;
   simulated[20] = 9.0F;  // more than 3 days away
   simulated[21] = simulated[27] = 4.0F;
-  const std::vector<ShownPeak> peaks = largestPeaks(seriesFrom({2001, 1, 1}, kSecondsOfDay, observed, simulated));
+  const std::vector<ShownPeak> peaks =
+      largestPeaks(shownPairs(seriesFrom({2001, 1, 1}, kSecondsOfDay, observed, simulated)));
   ASSERT_EQ(peaks.size(), 2U);
   EXPECT_EQ(peaks[0].second, secondNumber({2001, 1, 11}));
   EXPECT_THAT((std::array{peaks[0].observed, peaks[0].simulated, peaks[0].percent, peaks[0].hoursLater}),

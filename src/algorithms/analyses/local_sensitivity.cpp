@@ -165,33 +165,6 @@ void noteWithoutEffect(std::span<const EvaluationResult> results, PerturbationPl
   }
 }
 
-/// The warning of perturbed runs that fit better than the base set; empty where there is none.
-std::string betterFitText(std::span<const EvaluationResult> results) {
-  constexpr double kRounding = 1.0 - 1.0e-6;  // of the values that the model writes
-  const EvaluationResult& base = results.front();
-  const EvaluationResult* best = nullptr;
-  std::size_t count = 0;
-  const ComparedObservations observations(results);
-  for (std::size_t i = 1; i < results.size(); ++i) {
-    const EvaluationResult& result = results[i];
-    // A negative aggregate is no measure of a misfit.
-    if (!base.ok() || !result.ok() || !(result.aggregate >= 0.0 && result.aggregate < base.aggregate * kRounding) ||
-        !observations.areSame(i, 0)) {
-      continue;
-    }
-    ++count;
-    if (best == nullptr || result.aggregate < best->aggregate) best = &result;
-  }
-  if (best == nullptr) return {};
-  const std::string which =
-      count == 1
-          ? fmt::format("evaluation {} fits better than the base set: its", best->number)
-          : fmt::format("{} evaluations fit better than the base set, evaluation {} best: its", count, best->number);
-  return fmt::format(
-      "Warning: {} aggregate is {}, not {}; the base set is not the best, and its derivatives and deviations mislead",
-      which, formatReal(best->aggregate), formatReal(base.aggregate));
-}
-
 void appendTable(std::vector<std::string>& lines, const std::string& title, std::span<const std::string> outputs,
                  std::span<const std::string> parameters, std::span<const std::vector<double>> rows) {
   lines.emplace_back();
@@ -331,6 +304,32 @@ std::vector<DataTable> sensitivityTables(const LocalSensitivity& sensitivity, co
   return {std::move(table)};
 }
 
+std::string betterFitText(std::span<const EvaluationResult> results) {
+  constexpr double kRounding = 1.0 - 1.0e-6;  // of the values that the model writes
+  const EvaluationResult& base = results.front();
+  const EvaluationResult* best = nullptr;
+  std::size_t count = 0;
+  const ComparedObservations observations(results);
+  for (std::size_t i = 1; i < results.size(); ++i) {
+    const EvaluationResult& result = results[i];
+    // A negative aggregate is no measure of a misfit.
+    if (!base.ok() || !result.ok() || !(result.aggregate >= 0.0 && result.aggregate < base.aggregate * kRounding) ||
+        !observations.areSame(i, 0)) {
+      continue;
+    }
+    ++count;
+    if (best == nullptr || result.aggregate < best->aggregate) best = &result;
+  }
+  if (best == nullptr) return {};
+  const std::string which =
+      count == 1
+          ? fmt::format("evaluation {} fits better than the base set: its", best->number)
+          : fmt::format("{} evaluations fit better than the base set, evaluation {} best: its", count, best->number);
+  return fmt::format(
+      "{} aggregate is {}, not {}; the base set is not the best, and its derivatives and deviations mislead", which,
+      formatReal(best->aggregate), formatReal(base.aggregate));
+}
+
 std::vector<std::string> formatSensitivity(const LocalSensitivity& sensitivity, const AnalysisNames& names) {
   std::vector<std::string> lines{"Local sensitivity analysis"};
   for (std::size_t j = 0; j < names.parameters.size(); ++j) {
@@ -349,7 +348,7 @@ std::vector<std::string> formatSensitivity(const LocalSensitivity& sensitivity, 
     appendTable(lines, "Derivatives of " + what, outputs, names.parameters, table.derivatives);
     appendTable(lines, "Scaled sensitivities of " + what, outputs, names.parameters, table.scaled);
   };
-  if (std::string text = betterFitText(sensitivity.results); !text.empty()) lines.push_back(std::move(text));
+  if (const std::string text = betterFitText(sensitivity.results); !text.empty()) lines.push_back("Warning: " + text);
   appendBoth("output measures", sensitivity.measures, names.measures);
   appendBoth("objective functions", sensitivity.objectives, names.objectives);
 

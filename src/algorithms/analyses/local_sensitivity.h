@@ -80,4 +80,7 @@ std::vector<DataTable> sensitivityTables(const LocalSensitivity& sensitivity, co
 /// The analysis as lines of text for the log.
 std::vector<std::string> formatSensitivity(const LocalSensitivity& sensitivity, const AnalysisNames& names);
 
+/// Says that perturbed runs fit better than the base set, the first of the results; empty where none does.
+std::string betterFitText(std::span<const EvaluationResult> results);
+
 }  // namespace mirevo

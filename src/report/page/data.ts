@@ -1,6 +1,7 @@
 // The data that the program writes into the page. Missing, NaN and infinite numbers are null. What a run does not have
 // is absent or empty: the page shows sections only for what exists.
 
+import { shorten } from './dom';
 import type { SeriesAbove, Views } from './views';
 
 export type Maybe = number | null;
@@ -26,6 +27,7 @@ export interface Run {
   period: [string, string] | null;
   seed: number | null;
   runNames?: string[]; // of the evaluations, from the first on; empty where one has none
+  closingWarnings?: string[]; // of the run, which the summary has, too
   notes: string[];
 }
 
@@ -65,6 +67,7 @@ export interface Comparison {
   evaluation: number; // whose pairs these are
   simulatedItem: string;
   observedItem: string;
+  counted?: string | null; // which observations count and how; null: all, alike
   pairs: number;
   missing: number; // observations without a simulated value
   span: [number, number];
@@ -200,6 +203,7 @@ export interface Sensitivity {
   derivatives: Maybe[][]; // one row per parameter, one column per output
   dimensionless: Maybe[][];
   composite: Maybe[];
+  hasBetterFit?: boolean; // another set fits better than that of the analysis
   isOfObservations?: boolean; // the composite, rather than of the objective functions or output measures
   ranking: string[];
   covariance: Covariance | null;
@@ -256,6 +260,11 @@ export function readReportData(text: string): ReportData {
 export function variableParameters(data: ReportData): Parameter[] {
   return data.parameters.filter((parameter) => parameter.kind === 'variable');
 }
+
+export type Unit = string | null | undefined;
+
+/** "Residual [m3/s]". */
+export const withUnit = (text: string, unit: Unit): string => (unit ? `${text} [${shorten(unit, 20)}]` : text);
 
 /** Milliseconds since 1970 of `length` values. */
 export function timesOf(times: Times, length: number): number[] {

@@ -12,6 +12,7 @@ interface Finding {
 }
 
 const kFindingsShown = 5;
+const kScenariosShown = 200;
 
 /** The first few, and the others behind a fold that names them. */
 function folded(all: { name: string; text: string }[], others: string): Finding[] {
@@ -79,7 +80,7 @@ function findings(data: ReportData): Finding[] {
     found.push({ kind: 'warning', text: `${counted(run.failed, 'evaluation')} failed (${percent(run.failed / run.evaluations, 2)}).` });
   }
   return [...found.filter((finding): finding is Finding => finding !== null),
-    ...run.notes.map((text): Finding => ({ kind: 'warning', text }))];
+    ...[...run.closingWarnings ?? [], ...run.notes].map((text): Finding => ({ kind: 'warning', text }))];
 }
 
 function tile(label: string, value: string, more?: string | null): HTMLElement {
@@ -131,37 +132,40 @@ export function runSection(data: ReportData): Section {
 }
 
 // The positions of the start and the best value between the bounds, on the search scale.
-function rangeBar(parameter: Parameter): Node | string {
+function rangeBar(parameter: Parameter, [startName, bestName]: string[]): Node | string {
   const best = placeBetweenBounds(parameter, parameter.best);
   const start = placeBetweenBounds(parameter, parameter.start);
   if (best === null && start === null) return '';
-  const label = `start at ${percent(start, 2)}, best at ${percent(best, 2)} of the way from the lower to the upper bound`;
+  const label = `${startName!.toLowerCase()} at ${percent(start, 2)}, ${bestName!.toLowerCase()} at ${percent(best, 2)} of the way from the lower to the upper bound`;
   const mark = (kind: string, place: number | null) =>
     place === null ? null : make('i', { class: kind, style: `left: ${Math.min(100, Math.max(0, place * 100)).toFixed(2)}%` });
   return make('span', { class: 'range', role: 'img', 'aria-label': label, title: label }, mark('start', start), mark('best', best));
 }
 
-function parameterRow(parameter: Parameter): (Node | string | null)[] {
+function parameterRow(parameter: Parameter, names: string[]): (Node | string | null)[] {
   const traits = [parameter.kind === 'variable' ? null : parameter.kind, parameter.transformation === 'logarithmic' ? 'logarithmic' : null,
     parameter.integer ? 'integer' : null, parameter.equation ? `= ${parameter.equation}` : null].filter(Boolean).join(', ');
   return [
     make('span', {}, parameter.name, parameter.comment ? make('small', {}, parameter.comment) : null),
     number(parameter.lower, 10), number(parameter.upper, 10), number(parameter.start, 6), number(parameter.best, 10),
-    rangeBar(parameter),
+    rangeBar(parameter, names),
     parameter.nearBound ? make('span', { class: 'flag' }, `near ${parameter.nearBound} bound`) : traits,
   ];
 }
 
 export function parameterSection(data: ReportData): Section | null {
   if (data.parameters.length === 0) return null;
+  const isSearch = data.run.task === 'optimisation';
+  const [start, best] = (isSearch ? ['Start', 'Best'] : ['In the setup', 'Smallest aggregate']) as [string, string];
+  const scale = isSearch ? 'on the scale of the search' : 'a logarithmic parameter on a logarithmic scale';
   const columns = [{ title: 'Parameter' }, { title: 'Lower', number: true }, { title: 'Upper', number: true },
-    { title: 'Start', number: true }, { title: 'Best', number: true },
-    { title: 'Between the bounds', hint: 'hollow: start, filled: best, on the scale of the search' }, { title: '' }];
+    { title: start, number: true }, { title: best, number: true },
+    { title: 'Between the bounds', hint: `hollow: ${start}, filled: ${best}, ${scale}` }, { title: '' }];
   return {
     id: 'parameters',
     title: 'Parameters',
-    content: [table(columns, data.parameters.map(parameterRow), 'Parameters'),
-      make('p', { class: 'note' }, 'Between the bounds: hollow mark start, filled mark best, on the scale of the search.')],
+    content: [table(columns, data.parameters.map((parameter) => parameterRow(parameter, [start, best])), 'Parameters'),
+      make('p', { class: 'note' }, `Between the bounds: hollow mark ${start.toLowerCase()}, filled mark ${best.toLowerCase()}, ${scale}.`)],
   };
 }
 
@@ -171,20 +175,24 @@ function change(initial: number | null, best: number | null): string {
 
 export function resultSection(data: ReportData): Section | null {
   const content: Node[] = [];
-  const values = [{ title: data.initialLabel === 'first evaluation' ? 'First' : 'Initial', number: true }, { title: 'Best', number: true },
-    { title: 'Change', number: true }];
+  const isSearch = data.run.task === 'optimisation';
+  const values = [{ title: data.initialLabel === 'first evaluation' ? 'First' : 'Initial', number: true },
+    { title: isSearch ? 'Best' : 'Smallest aggregate', number: true }, ...(isSearch ? [{ title: 'Change', number: true }] : [])];
+  const ofValues = (initial: number | null, best: number | null, isShare: boolean) =>
+    [number(initial, 6), number(best, 6), ...(isSearch ? [isShare ? change(initial, best) : kMissing] : [])];
   if (data.objectives.length > 0) {
     content.push(heading('Objective functions'), table([{ title: 'Objective function' }, ...values],
-      data.objectives.map(({ name, initial, best }) => [name, number(initial, 6), number(best, 6), change(initial, best)]), 'Objective functions'));
+      data.objectives.map(({ name, initial, best }) => [name, ...ofValues(initial, best, true)]), 'Objective functions'));
   }
   if (data.measures.length > 0) {
     content.push(heading('Output measures'), table(
       [{ title: 'Output measure' }, { title: 'Statistic' }, { title: 'Objective function' }, { title: 'Weight', number: true }, ...values],
       data.measures.map(({ name, statistic, objective, weight, isCriterion, initial, best }) =>
-        [name, statistic, objective ?? kMissing, number(weight), number(initial, 6), number(best, 6),
-          isCriterion ? kMissing : change(initial, best)]),
+        [name, statistic, objective ?? kMissing, number(weight), ...ofValues(initial, best, !isCriterion)]),
       'Output measures'));
   }
+  const scenarios = scenarioTable(data);
+  if (scenarios) content.push(heading('Scenarios'), scenarios);
   const ranking = rankingTable(data);
   if (ranking) content.push(heading('Best evaluations'), ranking);
   return content.length > 0 ? { id: 'results', title: 'Objectives and measures', content } : null;
@@ -194,6 +202,19 @@ export function resultSection(data: ReportData): Section | null {
 function nameOfRun(data: ReportData, evaluation: number): string {
   const name = data.run.runNames?.[evaluation - 1];
   return name ? `${count(evaluation)} (${shorten(name, 40)})` : count(evaluation);
+}
+
+/** What each scenario has for each measure and objective function. */
+function scenarioTable(data: ReportData): HTMLElement | null {
+  const { evaluations, measures, objectives, run } = data;
+  if (run.task !== 'scenarios' || evaluations.count < 2) return null;
+  const rows = evaluations.numbers.slice(0, kScenariosShown).map((evaluation, place) =>
+    [count(evaluation), run.runNames?.[evaluation - 1] ?? '', evaluations.ok[place] ? '' : 'failed',
+      ...[...evaluations.measures, ...evaluations.objectives].map((column) => number(column[place], 6))]);
+  const more = evaluations.numbers.length - kScenariosShown;
+  return make('div', {},
+    table([{ title: 'Scenario' }, { title: 'Name' }, { title: '' }, ...[...measures, ...objectives].map(({ name }) => ({ title: shorten(name, 40), hint: name, number: true }))], rows, 'Scenarios'),
+    more > 0 ? make('p', { class: 'note' }, `The first ${count(kScenariosShown)} scenarios; the result file has ${count(more)} more.`) : null);
 }
 
 function rankingTable(data: ReportData): HTMLElement | null {

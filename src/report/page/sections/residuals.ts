@@ -2,6 +2,7 @@
 import { BoxplotChart } from 'echarts/charts';
 import { use } from 'echarts/core';
 import { axis, chart, tip, tooltip, type ChartPlan } from '../chart';
+import { withUnit, type Unit } from '../data';
 import { make } from '../dom';
 import { count, counted, number } from '../format';
 import type { Views } from '../views';
@@ -15,7 +16,7 @@ const kGrid = { left: 26, right: 16, top: 16, bottom: 28 };
 
 const monthName = (time: number) => new Date(time).toISOString().slice(0, 7);
 
-function monthsPlan({ of, residuals }: Views): ChartPlan {
+function monthsPlan({ of, residuals }: Views, unit: Unit): ChartPlan {
   return {
     title: 'Mean residual of each month',
     height: 240,
@@ -23,19 +24,19 @@ function monthsPlan({ of, residuals }: Views): ChartPlan {
     option: (look) => ({
       grid: { ...kGrid, left: 64, outerBoundsMode: 'none' },
       xAxis: axis(look, { type: 'time' }),
-      yAxis: axis(look, { name: 'Mean residual', nameGap: 48, scale: false }),
+      yAxis: axis(look, { name: withUnit('Mean residual', unit), nameGap: 48, scale: false }),
       tooltip: tooltip(look, { formatter: ({ value }: { value: number[] }) => tip(monthName(value[0]!), [['mean residual', number(value[1])]]) }),
       series: [{ name: 'mean residual', type: 'bar', barMaxWidth: 12, itemStyle: { color: look[of] }, data: residuals.months.map((time, index) => [time, residuals.monthMeans[index]!]) }],
     }),
     values: () => ({
-      columns: [{ title: 'Month' }, { title: 'mean residual', number: true }],
+      columns: [{ title: 'Month' }, { title: 'mean residual', number: true, unit }],
       length: residuals.months.length,
       row: (index) => [monthName(residuals.months[index]!), number(residuals.monthMeans[index])],
     }),
   };
 }
 
-function seasonalPlan({ of, residuals: { byMonth } }: Views): ChartPlan {
+function seasonalPlan({ of, residuals: { byMonth } }: Views, unit: Unit): ChartPlan {
   return {
     title: 'Residuals by month of the year',
     note: 'Box: 25 to 75 %, with the median; whiskers: 5 and 95 %.',
@@ -44,20 +45,20 @@ function seasonalPlan({ of, residuals: { byMonth } }: Views): ChartPlan {
     option: (look) => ({
       grid: kGrid,
       xAxis: axis(look, { type: 'category', data: kMonths }),
-      yAxis: axis(look, { name: 'Residual', nameGap: 44 }),
+      yAxis: axis(look, { name: withUnit('Residual', unit), nameGap: 44 }),
       tooltip: tooltip(look, { formatter: ({ dataIndex }: { dataIndex: number }) =>
         tip(kMonths[dataIndex]!, kQuantiles.map((name, index) => [name, number(byMonth[dataIndex]![index])])) }),
       series: [{ name: 'residuals', type: 'boxplot', data: byMonth.map((quantiles) => (quantiles[0] == null ? [] : quantiles)), itemStyle: { color: look.surface, borderColor: look[of], borderWidth: 1.5 } }],
     }),
     values: () => ({
-      columns: [{ title: 'Month' }, ...kQuantiles.map((title) => ({ title, number: true }))],
+      columns: [{ title: 'Month' }, ...kQuantiles.map((title) => ({ title, number: true, unit }))],
       length: 12,
       row: (index) => [kMonths[index]!, ...kQuantiles.map((_, at) => number(byMonth[index]![at]))],
     }),
   };
 }
 
-function flowsPlan({ of, residuals: { flows, ofFlows, n } }: Views): ChartPlan {
+function flowsPlan({ of, residuals: { flows, ofFlows, n } }: Views, unit: Unit): ChartPlan {
   const isPositive = flows.every((flow) => flow > 0);
   return {
     title: 'Residuals against the simulated value',
@@ -69,13 +70,13 @@ function flowsPlan({ of, residuals: { flows, ofFlows, n } }: Views): ChartPlan {
     switches: isPositive ? [{ key: 'log', label: 'Log' }] : [],
     option: (look, is) => ({
       grid: kGrid,
-      xAxis: axis(look, { name: 'Simulated', log: is('log'), nameGap: 26 }),
-      yAxis: axis(look, { name: 'Residual', nameGap: 44 }),
+      xAxis: axis(look, { name: withUnit('Simulated', unit), log: is('log'), nameGap: 26 }),
+      yAxis: axis(look, { name: withUnit('Residual', unit), nameGap: 44 }),
       tooltip: tooltip(look, { formatter: ({ value }: { value: number[] }) => tip('', [['simulated', number(value[0])], ['residual', number(value[1])]]) }),
       series: [{ name: 'residuals', type: 'scatter', symbolSize: 4, itemStyle: { color: look[of], opacity: 0.5 }, data: flows.map((flow, index) => [flow, ofFlows[index]!]) }],
     }),
     values: () => ({
-      columns: [{ title: 'simulated', number: true }, { title: 'residual', number: true }],
+      columns: [{ title: 'simulated', number: true, unit }, { title: 'residual', number: true, unit }],
       length: flows.length,
       row: (index) => [number(flows[index]), number(ofFlows[index])],
     }),
@@ -140,16 +141,17 @@ function normalPlan({ of, residuals: { normalQuantiles, standardised } }: Views)
   };
 }
 
-export function residualsView(views: Views): Node[] {
+export function residualsView(views: Views, unit: Unit): Node[] {
   const { residuals } = views;
   const hasAutocorrelation = residuals.autocorrelation.some((value) => value !== null);
-  const facts = `${count(residuals.n)} residuals, simulated less observed: mean ${number(residuals.mean)}, standard deviation ${number(residuals.standardDeviation)}.`;
+  const ofUnit = unit ? ` ${unit}` : '';
+  const facts = `${count(residuals.n)} residuals, simulated less observed: mean ${number(residuals.mean)}${ofUnit}, standard deviation ${number(residuals.standardDeviation)}${ofUnit}.`;
   return [
     make('p', { class: 'note' }, hasAutocorrelation ? facts : `${facts} Their autocorrelation is not shown: too few, or not equally spaced.`),
-    chart(monthsPlan(views)),
+    chart(monthsPlan(views, unit)),
     grid(...[
-      seasonalPlan(views),
-      flowsPlan(views),
+      seasonalPlan(views, unit),
+      flowsPlan(views, unit),
       ...(hasAutocorrelation ? [autocorrelationPlan(views)] : []),
       ...(residuals.normalQuantiles.length > 0 ? [normalPlan(views)] : []),
     ].map(chart)),

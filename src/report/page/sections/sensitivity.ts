@@ -96,14 +96,13 @@ function correlationContent(covariance: Covariance): Node[] {
 }
 
 const kAssumptions = [
-  'The set is the one that fits best: a better one elsewhere is not covered.',
   'The model is linear in the parameters, on the scale of the search, between the limits.',
   'The errors (residuals times their weights) are normally distributed with mean 0 and one variance, which is estimated from the residuals; the limits are quantiles of Student\u2019s t.',
   'The errors are independent of one another. Residuals that follow one another make the limits too narrow; the log states their lag-1 correlation and by how much.',
   'The model, its input and its equations are right, and parameters that are left out or fixed are known exactly. The limits take no account of the bounds.',
 ];
 
-function covarianceContent(data: ReportData, covariance: Covariance): Node[] {
+function covarianceContent(data: ReportData, covariance: Covariance, hasBetterFit: boolean): Node[] {
   const columns = [{ title: 'Parameter' }, { title: 'Estimate', number: true }, { title: 'Standard deviation', number: true },
     { title: 'Lower limit', number: true }, { title: 'Upper limit', number: true }, { title: 'Deviation / estimate', number: true }];
   const rows = covariance.names.map((name, index) => {
@@ -114,7 +113,10 @@ function covarianceContent(data: ReportData, covariance: Covariance): Node[] {
   return [
     heading('Confidence limits'),
     paragraph('What the limits assume:'),
-    make('ul', {}, ...kAssumptions.map((text) => make('li', {}, text))),
+    make('ul', {}, hasBetterFit
+      ? make('li', {}, 'The set is the one that fits best. ', make('strong', {}, 'It is not: a warning at the top says which fits better, and the limits mislead.'))
+      : make('li', {}, 'The set is the one that fits best: a better one elsewhere is not covered.'),
+    ...kAssumptions.map((text) => make('li', {}, text))),
     table(columns, rows, 'Confidence limits'),
     ...(covariance.leftOut.length > 0 ? [paragraph(`Left out: ${covariance.leftOut.map(({ name, reason }) => `\u2068${shorten(name, 60)}\u2069 (\u2068${reason}\u2069)`).join('; ')}.`)] : []),
     chart(confidencePlan(data, covariance)),
@@ -135,6 +137,6 @@ export function sensitivitySection(data: ReportData): Section | null {
     content.push(heading('Derivatives'), table([{ title: 'Parameter' }, ...outputs.map((title) => ({ title: shorten(title, 40), hint: title, number: true }))],
       parameters.map((name, index) => [name, ...outputs.map((_, column) => number(derivatives[index]?.[column]))]), 'Derivatives'));
   }
-  if (sensitivity.covariance) content.push(...covarianceContent(data, sensitivity.covariance));
+  if (sensitivity.covariance) content.push(...covarianceContent(data, sensitivity.covariance, sensitivity.hasBetterFit ?? false));
   return { id: 'sensitivity', title: 'Sensitivity', content };
 }

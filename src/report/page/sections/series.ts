@@ -1,6 +1,6 @@
 // Simulated against observed series: how well they fit, at which times they do not, and in which range of values.
 import { axis, chart, legend, lineEntries, timeZoom, tip, tooltip, type ChartPlan } from '../chart';
-import { timesOf, type Figures, type Maybe, type ReportData, type Series } from '../data';
+import { timesOf, withUnit, type Figures, type Maybe, type ReportData, type Series } from '../data';
 import { shorten, table } from '../dom';
 import { count, moment, number } from '../format';
 import type { Look } from '../look';
@@ -44,7 +44,7 @@ const lineStyles = (look: Look) => ({
 });
 
 /** Names that fit a small chart. */
-const short = (simulated: Simulated[]) => simulated.map((one) => ({ ...one, name: one.key }));
+const short = (data: ReportData, series: Series) => simulations(data, series).map((one) => ({ ...one, name: one.key === 'initial' && data.initialLabel === 'first evaluation' ? 'first' : one.key }));
 
 export function outside(times: number[], period: Series['period']): [number, number][] {
   const [first, last] = [times[0], times[times.length - 1]];
@@ -118,7 +118,7 @@ function hydrographPlan(data: ReportData, series: Series): ChartPlan {
         ],
         yAxis: [
           axis(look, { name: labelOf(series), nameGap: 48, ...(is('log') ? logRange(all) : { scale: !reachesZero(all) }) }),
-          axis(look, { name: 'Residual', gridIndex: 1, nameGap: 48, splitNumber: 2, scale: false }),
+          axis(look, { name: withUnit('Residual', series.unit), gridIndex: 1, nameGap: 48, splitNumber: 2, scale: false }),
         ],
         dataZoom: timeZoom(look, [0, 1], 'filter', (time) => moment(time, step)),
         tooltip: tooltip(look, {
@@ -168,10 +168,11 @@ function scenarioPlan(data: ReportData, series: Series): ChartPlan {
   const step = [times, ...runs.map((run) => run.times)].flatMap((own) => own.slice(1, 1000).map((time, at) => time - own[at]!)).reduce((a, b) => Math.min(a, b), 86400000);
   return {
     title: 'The scenarios',
-    note: 'An entry of the legend switches its scenario off and on. Drag across the chart to zoom in, move the slider below to go along.',
+    note: `An entry of the legend switches its scenario off and on.${series.periods ? kShadedNote : ''} Drag across the chart to zoom in, move the slider below to go along.`,
     height: 430,
     zoom: 'x',
     thinned: (series.scenarios ?? []).some(({ thinned }) => thinned),
+    spans: spansOf(series),
     switches: [{ key: 'log', label: 'Log' }],
     option: (look, is) => ({
       legend: legend(look, { itemWidth: 34, data: [...lineEntries(runs.map(({ name }) => name)), ...observedEntry(isPoints)] }),
@@ -198,7 +199,7 @@ function scenarioPlan(data: ReportData, series: Series): ChartPlan {
           lineStyle: { color: look.many[index % look.many.length], width: 1.6, type: (['solid', 'dashed', 'dotted'] as const)[Math.floor(index / look.many.length) % 3] },
         })),
         ...drawnLine('observed', isPoints ? { ...observed, times: [], values: [] } : observed, is('log'), look.observed,
-          { lineStyle: { color: look.observed, width: 1 }, z: 4 }),
+          { lineStyle: { color: look.observed, width: 1 }, z: 4, ...(series.periods ? shadedPeriods(look, series) : {}) }),
       ],
     }),
     values: () => {
@@ -223,7 +224,7 @@ function scatterPlan(data: ReportData, series: Series): ChartPlan {
   const places = judgedPlaces(series);
   const times = timesOf(series, series.observed.length);
   const observed = places.map((place) => series.observed[place] ?? null);
-  const simulated = short(simulations(data, series));
+  const simulated = short(data, series);
   return {
     title: 'Simulated against observed',
     height: 340,
@@ -245,8 +246,8 @@ function scatterPlan(data: ReportData, series: Series): ChartPlan {
       return {
         legend: legend(look, { data: dots.map(({ name }) => name), selected: dots.length > 1 ? { [dots[0]!.name]: false } : {} }),
         grid: { left: 26, right: 16, top: 36, bottom: 28 },
-        xAxis: axis(look, { ...both, name: 'Observed', nameGap: 26 }),
-        yAxis: axis(look, { ...both, name: 'Simulated', nameGap: 44 }),
+        xAxis: axis(look, { ...both, name: withUnit('Observed', series.unit), nameGap: 26 }),
+        yAxis: axis(look, { ...both, name: withUnit('Simulated', series.unit), nameGap: 44 }),
         tooltip: tooltip(look, { formatter: (point: { value?: number[]; seriesName: string }) => (point.value && point.value.length > 2
           ? tip(moment(times[point.value[2]!]!), [['observed', number(point.value[0])], [shorten(point.seriesName, 40), number(point.value[1])]])
           : '') }),
@@ -278,7 +279,7 @@ function givenCurve({ flowDuration }: Series, key: 'observed' | 'initial' | 'bes
 function durationPlan(data: ReportData, series: Series): ChartPlan {
   const places = judgedPlaces(series);
   const curves = [
-    ...short(simulations(data, series)),
+    ...short(data, series),
     { key: 'observed' as const, name: 'observed', values: series.observed },
   ].map((curve) => {
     const points = givenCurve(series, curve.key) ?? durationCurve(places.map((place) => curve.values[place] ?? null));
@@ -329,7 +330,7 @@ function figuresTable(data: ReportData, series: Series): HTMLElement | null {
   if (series.figures?.initial) rows.push([data.initialLabel ?? 'initial parameters', series.figures.initial]);
   if (series.figures?.best) rows.push(['best', series.figures.best]);
   if (rows.length === 0) return null;
-  return table([{ title: 'Evaluation period' }, ...kFigures.map(([, title, hint]) => ({ title, hint, number: true }))],
+  return table([{ title: 'Evaluation period' }, ...kFigures.map(([key, title, hint]) => ({ title: key === 'rmse' ? withUnit(title, series.unit) : title, hint, number: true }))],
     rows.map(([name, figures]) => [name, ...kFigures.map(([key]) => (key === 'n' ? number(figures.n, 9) : number(figures[key])))]),
     `Figures of ${series.measure}`);
 }

@@ -13,16 +13,16 @@ function folded(title: string, content: () => Node[]): HTMLElement {
 }
 
 /** `label`: what an axis says of the values. */
-export function viewsOf({ measure, views }: Series, label: string): Node[] {
+export function viewsOf({ measure, unit, views }: Series, label: string): Node[] {
   if (!views) return [];
   const { peaks } = views;
   return [
     folded('Seasons and years', () => [
-      fitsTable(views, measure),
-      make('p', { class: 'note' }, 'Over all times of the hydrograph. Efficiencies need 10 values.'),
+      fitsTable(views, measure, unit),
+      make('p', { class: 'note' }, 'Over the evaluation period. Efficiencies need 10 values.'),
     ]),
-    folded('Low flows and floods', () => extremesView(views, label)),
-    ...(peaks && peaks.length > 0 ? [folded('Largest peaks', () => [peaksTable(views, peaks, measure)])] : []),
-    folded('Residuals', () => residualsView(views)),
+    folded('Low flows and floods', () => extremesView(views, label, unit)),
+    ...(peaks && peaks.length > 0 ? [folded('Largest peaks', () => [peaksTable(views, peaks, measure, unit)])] : []),
+    folded('Residuals', () => residualsView(views, unit)),
   ];
 }
