@@ -220,7 +220,7 @@ TEST(Scenarios, HaveNamesAndTheirSeriesInTheReport) {
   EXPECT_THAT(report, HasSubstr(R"("runNames":["","dry",""])"));
   EXPECT_THAT(report, HasSubstr(R"("quantity":"Discharge","unit":"m3/s")"));
   for (int number = 1; number <= 3; ++number) {
-    EXPECT_THAT(report, HasSubstr(fmt::format(R"({{"number":{},"count":)", number)));
+    EXPECT_THAT(report, HasSubstr(fmt::format(R"({{"number":{},"thinned":false,"count":)", number)));
   }
 }
 

@@ -11,6 +11,7 @@ after(() => browser.close());
 /** Runs in the page: texts that overlap, are cut off or reach out of the window or their chart. */
 function misfits() {
   const found = [];
+  document.head.append(Object.assign(document.createElement('style'), { textContent: '.table, pre { max-height: none !important }' })); // what scrolls
   const label = (text) => text.trim().slice(0, 40);
   const overlap = (a, b) => Math.min(a.right, b.right) - Math.max(a.left, b.left) > 2 && Math.min(a.bottom, b.bottom) - Math.max(a.top, b.top) > 2;
   const compare = (texts, where) => texts.forEach(([text, a], index) => texts.slice(index + 1).forEach(([other, b]) => {

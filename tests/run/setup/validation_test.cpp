@@ -292,7 +292,7 @@ TEST_F(ValidationTest, RefusesNumbersOutsideTheRangeOfTheirRow) {
     for (const double value : {below, facts.range.highest + (isReal ? 1e-6 : 1)}) {
       if (!std::isfinite(value)) continue;
       SCOPED_TRACE(fmt::format("{} {} = {}", section->path, facts.name, value));
-      const std::string number = isReal ? fmt::format("{:.12g}", value) : fmt::format("{:.0f}", value);
+      const std::string number = isReal ? fmt::format("{:.15g}", value) : fmt::format("{:.0f}", value);
       const std::string error = failureOf(withValue(text, section->path, facts.name, number));
       EXPECT_THAT(error, StartsWith(std::string(facts.refusal)));
       EXPECT_THAT(error, HasSubstr(fmt::format("{}: expected {}, found ", facts.name, facts.range.text())));
