@@ -183,7 +183,7 @@ std::vector<std::string> doubtsOfCodes(TimeSeriesObject& observation, const Outp
   const std::span<const double> codes =
       itemValues(observation, measure, weighting.qualityItem, weighting.qualityLocation);
   std::map<double, std::size_t> counts;
-  forEachCounted(observation, measure, period, [&](std::size_t step) {
+  forEachStepIn(period, observation, [&](std::size_t step) {
     if (observed[step] && !std::isnan(codes[step])) ++counts[codes[step]];
   });
   for (const std::string& doubt : {doubtOfList("Quality_Left_Out", weighting.leftOut, counts),
@@ -216,7 +216,8 @@ void requireCounting(TimeSeriesObject& observation, const OutputMeasure& measure
                           nameOf(observation, weighting.weightItem));
   }
   fatalError("Error: No observation counts for output measure " + measure.name,
-             fmt::format("{}{}: each of {} of item No. {} ({}) in the evaluation period has {}\n"
+             fmt::format("{}{}: each of {} of item No. {} ({}) that the measure's period, months and limits leave in "
+                         "the evaluation period has {}\n"
                          "{}compare another item or period",
                          weighting.leftOut.empty() ? weighting.weightLocation : weighting.qualityLocation,
                          trimTrailing(measure.observation.fileName), countText(count, "value"),

@@ -99,11 +99,15 @@ std::unique_ptr<SeriesRecorder> openSeries(const RunConfig& config, const Search
   run.initialValues = ToModelScale(space, space.initial);
   run.kept = keptSeries(config, output);
   const auto steps = config.task ? config.task->keptSteps() : std::nullopt;
-  run.keepsSteps = steps.has_value();
+  // Measures with times of their own keep to the observations.
+  const bool keepsSteps = steps && std::ranges::all_of(output.shownMeasures(), [&config](std::size_t measure) {
+                            return config.measures[measure].timeMatch.isUsual();
+                          });
+  run.keepsSteps = keepsSteps;
   run.evaluationFirst = secondNumber(config.period.start);
   run.evaluationLast = secondNumber(config.period.end);
   run.keepsAllPeriods =
-      config.validationPeriods.empty() || (steps && run.evaluationFirst <= run.periodFirst &&
+      config.validationPeriods.empty() || (keepsSteps && run.evaluationFirst <= run.periodFirst &&
                                            secondNumber(steps->end.value_or(config.period.end)) >= run.periodLast);
   auto series = std::make_unique<SeriesRecorder>(path, std::move(run), runTimeClock,
                                                  [&log](std::string_view text) { log.warning(text); });

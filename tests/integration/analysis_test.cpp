@@ -95,6 +95,35 @@ TEST(LocalSensitivity, WeighsEachObservationByItsOwnError) {
   EXPECT_EQ(jacobian.rows[0][2], "4");
 }
 
+TEST(LocalSensitivity, TakesAnObservationOnceFromTheFirstMeasureThatHasASimulatedValue) {
+  const ModelFolder folder;
+  std::string observed;
+  const std::string before = folder.read("observed.csv");
+  for (const std::string_view line : splitLines(before)) {
+    const bool isMoved = line.starts_with("2001-01") || line.starts_with("2001-02");  // between two steps
+    const std::size_t comma = line.find(',');
+    observed += fmt::format("{}{}{}\n", line.substr(0, comma), isMoved ? " 12:00" : "", line.substr(comma));
+  }
+  folder.write("observed.csv", observed);
+  const std::string setup = folder.writeSetup({.option = 1});
+  const std::string text = folder.read("basin.kdx");
+  const std::size_t begin = text.find("[MEASURE_1]");
+  const std::size_t end = text.find("[/MEASURE_1]") + 12;
+  std::string second = text.substr(begin, end - begin);
+  second.replace(0, 11, "[MEASURE_2]").replace(second.find("[/MEASURE_1]"), 12, "[/MEASURE_2]");
+  second.replace(second.find("'flow'"), 6, "'other'");
+  std::string both = text.substr(0, end) + "\n" + second + text.substr(end);
+  const std::size_t count = both.rfind("TqSEKdxListItemCount = 1", begin);
+  both.replace(count, 24, "TqSEKdxListItemCount = 2");
+  both.insert(both.find("[MEASURE_1]") + 11, "\n Time_Match = 'exact'");
+  folder.write("basin.kdx", both);
+  const ProgramResult run = runProgram({setup});
+  ASSERT_EQ(run.exitCode, 0) << run.error;
+  std::map<std::string, int> counts;
+  for (const auto& row : readDataTable(folder.read("basin_Jacobian.dat")).rows) ++counts[row[0]];
+  EXPECT_EQ(counts, (std::map<std::string, int>{{"flow", 306}, {"other", 59}}));
+}
+
 // Interpolated values have all digits, however coarse those that the model prints.
 TEST(LocalSensitivity, KnowsTheRoundingOfValuesBetweenTheObservations) {
   const ModelFolder folder;

@@ -99,7 +99,7 @@ TEST_F(SeriesTablesTest, WeightsThatCannotBeMeantEndTheRunOrAreWarnedOf) {
       {{.weightItem = 4}, "Error: Item No. 4 not found in " + folder_ / "weighed.csv", "the file has 3 items"},
       {{.qualityItem = 3, .leftOut = {1, 3, 4}},
        "Error: No observation counts for output measure Flow",
-       "each of 3 values of item No. 1 (Q) in the evaluation period has a code of Quality_Left_Out (1, 3, 4)"},
+       "leave in the evaluation period has a code of Quality_Left_Out (1, 3, 4)"},
       {{.qualityItem = 3, .leftOut = {2, 7}},
        "",
        "has a code of Quality_Left_Out (2, 7); there are 1 (1 time), 3 (1 time), 4 (1 time)"},

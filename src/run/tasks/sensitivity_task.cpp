@@ -83,7 +83,8 @@ ComparedValues compareSeries(const TaskContext& context, std::span<const Evaluat
   ComparedValues compared;
   compared.simulated.resize(results.size());
   std::vector<std::size_t> taken;
-  std::vector<const ObservedSeries*> weighed;
+  /// With the place of its first simulated value.
+  std::vector<std::pair<const ObservedSeries*, std::size_t>> weighed;
   std::size_t first = 0;
   for (const ObservedSeries& series : context.observedSeries) {
     const std::size_t count = series.values.size();
@@ -98,10 +99,16 @@ ComparedValues compareSeries(const TaskContext& context, std::span<const Evaluat
         });
     if (!isInObjective(context, series.measure) || isRepeated || isLeft) continue;
     taken.push_back(series.measure);
-    // Of measures that compare the same items with other weights of the observations, the first has each of these.
+    // Of measures that compare the same items in another way, the first that has a simulated value for an observation
+    // has it.
     const auto isWeighed = [&](double days) {
-      return std::ranges::any_of(weighed, [&](const ObservedSeries* other) {
-        return isSameItems(measure, measures[other->measure]) && std::ranges::binary_search(other->days, days);
+      return std::ranges::any_of(weighed, [&](const auto& other) {
+        const std::vector<double>& times = other.first->days;
+        if (!isSameItems(measure, measures[other.first->measure])) return false;
+        const auto found = std::ranges::lower_bound(times, days);
+        if (found == times.end() || *found != days) return false;
+        const EvaluationResult& base = results.front();
+        return base.ok() && std::isfinite(base.simulatedValues[other.second + (found - times.begin())]);
       });
     };
     // The run that shows most digits tells the unit: in another one all values may end with zeros.
@@ -124,7 +131,7 @@ ComparedValues compareSeries(const TaskContext& context, std::span<const Evaluat
       compared.weights.push_back(weight * weight);
       compared.labels.push_back({measure.name, isoTime(secondAfter(origin, series.days[t]))});
     }
-    if (hasWeight(measure)) weighed.push_back(&series);
+    if (hasWeight(measure)) weighed.emplace_back(&series, begin);
   }
   return compared;
 }
