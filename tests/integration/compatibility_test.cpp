@@ -47,7 +47,7 @@ class Compatibility : public ::testing::TestWithParam<std::string> {
   /// The lines on which programs may rely: without times, the version and warnings, and with the folder's kept name.
   using Line = std::pair<int, std::string>;  ///< with its number in the file
   std::vector<Line> lines(std::string text) const {
-    const std::string keptFolder = "/home/user/" + kept_.filename().string();
+    const std::string keptFolder = "/models/" + kept_.filename().string();
     for (std::size_t at = 0; (at = text.find(folder_.path(), at)) != std::string::npos;) {
       text.replace(at, folder_.path().size(), keptFolder);
     }
