@@ -96,7 +96,7 @@ void OutputReader::prepareValidation() {
   for (const auto& [i, k] : validationTargets(description_.measures, description_.validationPeriods)) {
     const ValidationPeriod& period = description_.validationPeriods[k];
     Validated& made =
-        validated_.emplace_back(Validated{i, description_.measures[i], judgedAs(period, description_.period)});
+        validated_.emplace_back(Validated{i, k, description_.measures[i], judgedAs(period, description_.period)});
     made.measure.selection.start.reset();  // its own period is one of calibration
     made.measure.selection.end.reset();
     if (!description_.isForRuns) continue;
@@ -200,14 +200,14 @@ void OutputReader::validate(EvaluationResult& result) {
     result.validationValues.push_back(found.value);
     result.validationPairs.push_back({found.pairCount, found.missingCount});
     if (found.missingCount == 0) continue;
-    const std::size_t period = validationTargets(description_.measures, description_.validationPeriods)[k].period;
     result.unusedObservations.push_back(
         {description_.measures.size() + k, found.pairCount,
          fmt::format("output measure {}: {} of {} observations in the validation period {} are not used, as item No. "
                      "{} of {} {}{}",
                      quotedForMessage(one.measure.name), found.missingCount, found.pairCount + found.missingCount,
-                     quotedForMessage(description_.validationPeriods[period].name), one.measure.simulation.itemNo,
-                     trimTrailing(one.measure.simulation.fileName), lackAtTimesOf(one.measure),
+                     quotedForMessage(description_.validationPeriods[one.periodIndex].name),
+                     one.measure.simulation.itemNo, trimTrailing(one.measure.simulation.fileName),
+                     lackAtTimesOf(one.measure),
                      found.firstUnused ? "; the first is at " + formatDate(*found.firstUnused) : "")});
   }
 }

@@ -72,7 +72,8 @@ class OutputReader final {
  private:
   /// A measure in a validation period.
   struct Validated {
-    std::size_t index = 0;  ///< of the measure
+    std::size_t index = 0;        ///< of the measure
+    std::size_t periodIndex = 0;  ///< of the validation period
     OutputMeasure measure;
     EvaluationPeriod period;
   };

@@ -43,7 +43,7 @@ std::span<const double> itemValues(TimeSeriesObject& observation, const OutputMe
   return observation.exactValues(item);
 }
 
-/// Beyond these the square of a weighted difference may leave the range of 32 bits.
+/// Beyond these the square of a weighted difference may leave the range of 32 bits, which statistics may use.
 constexpr double kSmallest = 1e-12;
 constexpr double kLargest = 1e12;
 
@@ -159,7 +159,7 @@ std::vector<double> stepWeights(TimeSeriesObject& observation, const OutputMeasu
     if (!observed[k] || (!codes.empty() && contains(weighting.leftOut, codes[k]))) continue;
     double weight = given.empty() ? 1.0 : weightOf(weighting, given[k]);
     if (!codes.empty() && contains(weighting.downWeighted, codes[k])) weight *= weighting.qualityWeight;
-    weights[k] = std::isfinite(static_cast<float>(weight)) ? weight : kNaN;  // statistics may use 32 bits
+    weights[k] = weight;
   }
   return weights;
 }
@@ -226,15 +226,15 @@ void requireCounting(TimeSeriesObject& observation, const OutputMeasure& measure
 }
 
 std::string describeWeighting(const ObservationWeighting& weighting) {
-  std::string text;
-  if (weighting.weightItem != 0) text += fmt::format(", weights in item No. {}", weighting.weightItem);
-  if (weighting.errorItem != 0) text += fmt::format(", standard errors in item No. {}", weighting.errorItem);
-  if (weighting.qualityItem != 0) text += fmt::format(", quality codes in item No. {}", weighting.qualityItem);
-  if (!weighting.leftOut.empty()) text += fmt::format(", left out {}", fmt::join(weighting.leftOut, " "));
+  std::vector<std::string> parts;
+  if (weighting.weightItem != 0) parts.push_back(fmt::format("weights in item No. {}", weighting.weightItem));
+  if (weighting.errorItem != 0) parts.push_back(fmt::format("standard errors in item No. {}", weighting.errorItem));
+  if (weighting.qualityItem != 0) parts.push_back(fmt::format("quality codes in item No. {}", weighting.qualityItem));
+  if (!weighting.leftOut.empty()) parts.push_back(fmt::format("left out {}", fmt::join(weighting.leftOut, " ")));
   if (!weighting.downWeighted.empty()) {
-    text += fmt::format(", weight {} for {}", weighting.qualityWeight, fmt::join(weighting.downWeighted, " "));
+    parts.push_back(fmt::format("weight {} for {}", weighting.qualityWeight, fmt::join(weighting.downWeighted, " ")));
   }
-  return text;
+  return fmt::format("{}", fmt::join(parts, ", "));
 }
 
 }  // namespace mirevo

@@ -37,8 +37,8 @@ struct ObservationWeighting {
 };
 
 /// One weight per step of an observation file; empty if all are 1. 0: there is no observation that counts. NaN: there
-/// is one whose weight is invalid (a negative weight, or a standard error that is not positive or missing). Throws
-/// FatalError if an item cannot be read.
+/// is one whose weight is invalid (a weight that is neither 0 nor from 1e-12 to 1e12, or a standard error that is not
+/// from 1e-12 to 1e12 or missing). Throws FatalError if an item cannot be read.
 std::vector<double> stepWeights(TimeSeriesObject& observation, const OutputMeasure& measure);
 /// The same; throws FatalError, with file, item and time, if there is an invalid one in the period.
 std::vector<double> observationWeights(TimeSeriesObject& observation, const OutputMeasure& measure,
@@ -50,7 +50,7 @@ std::vector<std::string> doubtsOfCodes(TimeSeriesObject& observation, const Outp
 /// Throws FatalError if there are observations in the period, and none of them counts.
 void requireCounting(TimeSeriesObject& observation, const OutputMeasure& measure, const EvaluationPeriod& period);
 
-/// For people, behind a comma: "standard errors in item No. 2"; empty if all weights are 1.
+/// For people: "standard errors in item No. 2, left out 5 7"; empty if all weights are 1.
 std::string describeWeighting(const ObservationWeighting& weighting);
 
 }  // namespace mirevo

@@ -206,13 +206,17 @@ std::string SeriesTables::countedText(const ObservedSeries& observed, const Outp
                                       const EvaluationPeriod& period) {
   if (period.warmUpDays == 0.0 && describeSelection(measure.selection).empty() && !measure.weighting.isUsed())
     return {};
+  return fmt::format(", of which {} of {} observations in the evaluation period count", observed.values.size(),
+                     observationCount(observed.measure, measure, period));
+}
+
+std::size_t SeriesTables::observationCount(std::size_t index, const OutputMeasure& measure,
+                                           const EvaluationPeriod& period) {
   OutputMeasure all = measure;
   all.selection = {};
   all.weighting = {};
-  const ObservedSeries whole = readObservedSeries(observed.measure, all, {period.start, period.end},
-                                                  SeriesPrecision::single, observation(observed.measure));
-  return fmt::format(", of which {} of {} observations in the evaluation period count", observed.values.size(),
-                     whole.values.size());
+  return readObservedSeries(index, all, {period.start, period.end}, SeriesPrecision::single, observation(index))
+      .values.size();
 }
 
 void SeriesTables::warnOfLongSteps(const TimeSeriesObject& simulation, const OutputMeasure& measure) {
@@ -249,17 +253,11 @@ void SeriesTables::checkSelection(const ObservedSeries& observed, const OutputMe
   const std::size_t count = observed.values.size();
   const bool isSelected = period.warmUpDays > 0.0 || !describeSelection(measure.selection).empty();
   if (isSelected && count < kFew) {
-    OutputMeasure all = measure;
-    all.selection = {};
-    all.weighting = {};
-    const EvaluationPeriod whole{period.start, period.end};
-    TimeSeriesObject& series = observation(observed.measure);
-    const std::size_t countOfAll =
-        readObservedSeries(observed.measure, all, whole, SeriesPrecision::single, series).values.size();
+    const std::size_t countOfAll = observationCount(observed.measure, measure, period);
     const std::string& location =
         measure.selection.location.empty() ? measure.observation.fileLocation : measure.selection.location;
     const std::string selected = fmt::format("{}: {}", observationNames_[observationIndex_[observed.measure]],
-                                             describeSelected(measure, period, series));
+                                             describeSelected(measure, period, observation(observed.measure)));
     if (count == 0 && countOfAll > 0) {
       fatalError("Error: No observation counts for output measure " + measure.name, location + selected);
     }

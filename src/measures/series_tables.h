@@ -76,6 +76,8 @@ class SeriesTables final {
   void requireDefined(const ObservedSeries& observed, const OutputMeasure& measure);
   /// ", of which 300 of 365 observations in the evaluation period count"; empty if all do, unless they are missing.
   std::string countedText(const ObservedSeries& observed, const OutputMeasure& measure, const EvaluationPeriod& period);
+  /// Of the measure with this index in the evaluation period, whether they count or not.
+  std::size_t observationCount(std::size_t index, const OutputMeasure& measure, const EvaluationPeriod& period);
   /// Where daily means are to be made of steps that are longer.
   void warnOfLongSteps(const TimeSeriesObject& simulation, const OutputMeasure& measure);
   /// Of a file with several items of which the setup names none.

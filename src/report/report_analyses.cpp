@@ -149,10 +149,9 @@ std::string pairName(std::span<const OutputMeasure> measures, std::size_t measur
 }
 
 std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::string& filePrefix, const RunRecord& record,
-                                        std::vector<std::string>& faults) {
+                                        std::span<const SeriesLabel> labels, std::vector<std::string>& faults) {
   std::vector<ReportedBand> bands;
   const std::vector<std::size_t> shown = measuresOfDistinctPairs(config.measures);
-  const std::vector<SeriesLabel> labels = seriesLabels(config.measures, shown);
   for (std::size_t k = 0; k < shown.size(); ++k) {
     const std::size_t i = shown[k];
     const std::string path = runFilePath(filePrefix, run_files::kBand, static_cast<int>(i) + 1);

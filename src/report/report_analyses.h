@@ -21,9 +21,9 @@ std::string pairName(std::span<const OutputMeasure> measures, std::size_t measur
 
 /// The bands that an uncertainty analysis has written beside its results, one per pair of series; those that cannot be
 /// read are left out. `faults` gets a text on each that is damaged or not there; how long they were is in the record of
-/// the run.
+/// the run. `labels`: one per pair.
 std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::string& filePrefix, const RunRecord& record,
-                                        std::vector<std::string>& faults);
+                                        std::span<const SeriesLabel> labels, std::vector<std::string>& faults);
 
 /// The results of a local sensitivity analysis, computed from its rows, whose statistics are of 32 bits, and the pairs
 /// of its runs; empty without a row for the initial values.

@@ -169,6 +169,7 @@ struct ReportData {
   SeriesTable series;
   std::vector<std::optional<SeriesAbove>> above;  ///< one per shown series, or none at all
   std::vector<SeriesLabel> seriesLabels;          ///< one per series
+  std::vector<std::size_t> seriesMeasures;        ///< one per series: the first measure of its pair, 0-based
   std::vector<ScenarioSeries> scenarioSeries;
   std::vector<std::string> runNames;    ///< of the evaluations, from the first on; empty where one has none
   std::vector<ReportedPeriod> periods;  ///< the evaluation period, and those of validation; empty without any of these

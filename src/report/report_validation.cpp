@@ -10,7 +10,6 @@
 #include "common/calendar.h"
 #include "measures/observation_selection.h"
 #include "measures/period_series.h"
-#include "report/report_analyses.h"
 
 namespace mirevo {
 namespace {
@@ -62,12 +61,10 @@ void addValidation(const RunConfig& config, std::span<const ResultRow> rows, con
     data.run.notes.push_back(line + ". The figures of the validation periods that are made from them are left out.");
   }
   data.wholeSeries = data.series.series;
-  for (ShownSeries& series : data.series.series) {
+  for (std::size_t i = 0; i < data.series.series.size(); ++i) {
+    ShownSeries& series = data.series.series[i];
     series = partOf(series, data.periodFirst, data.periodLast);
-    for (const std::size_t i : measuresOfDistinctPairs(config.measures)) {
-      if (pairName(config.measures, i) == series.measure)
-        leaveCounted(countedPeriod(config.measures[i], config.period), series);
-    }
+    leaveCounted(countedPeriod(config.measures[data.seriesMeasures[i]], config.period), series);
   }
 }
 

@@ -75,6 +75,8 @@ class ReportBuilder final {
   void note(std::string sentence) { data_.run.notes.push_back(std::move(sentence)); }
 
   const ResultRow* rowOf(int number) const;
+  /// Of each pair of series; reads the observed files, at the first call alone.
+  const std::vector<SeriesLabel>& pairLabels();
   const SearchSpace& space() const { return parameters_.searchSpace(); }
 
   const RunConfig& config_;
@@ -83,6 +85,7 @@ class ReportBuilder final {
   RunSources sources_;
   const ResultRow* best_ = nullptr;
   const ResultRow* initial_ = nullptr;
+  std::optional<std::vector<SeriesLabel>> pairLabels_;
   ReportData data_;
 };
 
@@ -276,7 +279,7 @@ std::string countedText(const OutputMeasure& measure, const EvaluationPeriod& pe
     text += fmt::format("Observations count from {} on, after a warm-up. ", formatDate(endOfWarmUp(period)));
   }
   const std::string weighting = describeWeighting(measure.weighting);
-  if (!weighting.empty()) text += fmt::format("Weights and codes: {}. ", weighting.substr(2));  // without ", "
+  if (!weighting.empty()) text += fmt::format("Weights and codes: {}. ", weighting);
   const std::string matching = describeMatching(measure.timeMatch);
   if (!matching.empty()) text += fmt::format("Compared with {}. ", matching);
   return std::string(trimTrailing(text));
@@ -348,6 +351,11 @@ void ReportBuilder::addFailures() {
                    source.content ? "it holds no failures of this run" : source.reason));
 }
 
+const std::vector<SeriesLabel>& ReportBuilder::pairLabels() {
+  if (!pairLabels_) pairLabels_ = seriesLabels(config_.measures, measuresOfDistinctPairs(config_.measures));
+  return *pairLabels_;
+}
+
 void ReportBuilder::addSeries() {
   const std::vector<std::size_t> shown = measuresOfDistinctPairs(config_.measures);
   if (shown.empty() || initial_ == nullptr) return;
@@ -367,13 +375,13 @@ void ReportBuilder::addSeries() {
     return;
   }
   const std::vector<std::string> names = seriesNames(config_.measures, shown);
-  const std::vector<SeriesLabel> labels = seriesLabels(config_.measures, shown);
   std::vector<ShownSeries> series;
   for (std::size_t i = 0; i < shown.size(); ++i) {
     for (ShownSeries& read : data_.series.series) {
       if (read.measure != names[i]) continue;
       series.push_back(std::move(read));
-      data_.seriesLabels.push_back(labels[i]);
+      data_.seriesLabels.push_back(pairLabels()[i]);
+      data_.seriesMeasures.push_back(shown[i]);
       series.back().measure = pairName(config_.measures, shown[i]);
       std::string fault;
       data_.above.push_back(seriesAbove(config_.measures, shown[i], series.back().seconds, fault));
@@ -444,7 +452,7 @@ void ReportBuilder::addAnalyses() {
   const TaskReport task = config_.task->report();
   if (task.hasBands && hasAnalysis) {
     std::vector<std::string> faults;
-    data_.bands = reportedBands(config_, filePrefix_, sources_.record, faults);
+    data_.bands = reportedBands(config_, filePrefix_, sources_.record, pairLabels(), faults);
     for (const std::string& fault : faults) note(fault + ".");
     const std::vector<bool>& ok = data_.evaluations.ok;
     for (ReportedBand& band : data_.bands) {

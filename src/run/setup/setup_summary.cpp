@@ -59,8 +59,9 @@ class Summary final {
     }
     line("Output measures: {}", config_.measures.size());
     for (const OutputMeasure& measure : config_.measures) {
-      line("  {}: {}, {}{}, objective function {}", measure.name, statisticWithBest(measure), weightText(measure),
-           describeWeighting(measure.weighting), measure.functionName.empty() ? "none" : measure.functionName);
+      const std::string weighting = describeWeighting(measure.weighting);
+      line("  {}: {}, {}{}{}, objective function {}", measure.name, statisticWithBest(measure), weightText(measure),
+           weighting.empty() ? "" : ", ", weighting, measure.functionName.empty() ? "none" : measure.functionName);
       addPairing(measure);
     }
     line("Objective functions: {}", config_.objectives.size());
