@@ -52,6 +52,13 @@ constexpr std::int64_t secondNumber(const DateRecord& date) {
 /// The inverse of secondNumber(), with an hour of 0 to 23.
 DateRecord dateOfSecond(std::int64_t second);
 
+inline constexpr std::int64_t kSecondsOfDay = 86400;
+
+/// Milliseconds since 1970 from a secondNumber(): a time as browsers count it.
+constexpr std::int64_t epochMilliseconds(std::int64_t second) {
+  return (second - dayNumber(1970, 1, 1) * kSecondsOfDay) * 1000;
+}
+
 /// "2001-01-31 12:30", with ":SS" where the seconds are not 0.
 std::string formatDate(const DateRecord& date);
 

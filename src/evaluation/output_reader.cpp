@@ -126,7 +126,6 @@ RunComparison OutputReader::runComparison() const {
 }
 
 std::optional<std::int64_t> OutputReader::observationLeftOut(std::size_t measure) {
-  constexpr std::int64_t kSecondsOfDay = 86400;
   const OutputMeasure& compared = description_.measures[measure];
   const DateRecord last = countedPeriod(compared, description_.period).end;
   EvaluationPeriod rest{last, last};

@@ -19,7 +19,6 @@ namespace {
 
 constexpr double kHoursPerDay = 24.0;
 constexpr double kSecondsPerHour = 3600.0;
-constexpr std::int64_t kSecondsOfDay = 86400;
 /// Two steps farther apart than so many usual ones have a missing step between them.
 constexpr double kLargestRatio = 1.5;
 

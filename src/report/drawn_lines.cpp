@@ -4,13 +4,14 @@
 #include <cmath>
 #include <cstddef>
 
+#include "common/calendar.h"
+
 namespace mirevo {
 namespace {
 
 constexpr double kSame = 1.5;  ///< steps that differ by less than this factor are alike: months are
 constexpr double kFar = 10.0;  ///< among uneven steps, what is far longer than nearly all of them
 constexpr std::size_t kFewestSteps = 3;
-constexpr double kSecondsOfDay = 86400.0;
 
 /// How far apart successive values usually are, in seconds.
 struct UsualStep {
@@ -74,8 +75,8 @@ DrawnLine observedLine(std::span<const std::int64_t> seconds, std::span<const fl
   std::vector<double> steps;
   for (std::size_t k = 1; k < places.size(); ++k) steps.push_back(stepBetween(seconds, places[k - 1], places[k]));
   const UsualStep usual = usualStep(steps);
-  const bool isSparse =
-      usual.median > kSame * kSecondsOfDay && simulatedStep > 0.0 && usual.median >= 2.0 * simulatedStep;
+  const bool isSparse = usual.median > kSame * static_cast<double>(kSecondsOfDay) && simulatedStep > 0.0 &&
+                        usual.median >= 2.0 * simulatedStep;
   DrawnLine line;
   line.isPoints = !usual.isEven || isSparse;
   for (std::size_t k = 1; k < places.size(); ++k) {

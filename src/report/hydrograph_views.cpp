@@ -14,11 +14,6 @@ namespace {
 
 using Digits = JsonWriter::Digits;
 
-/// Milliseconds since 1970.
-std::int64_t milliseconds(std::int64_t second) {
-  return (second - dayNumber(1970, 1, 1) * kSecondsOfDay) * 1000;
-}
-
 void writeFits(JsonWriter& json, std::string_view key, const std::vector<RegimeFit>& fits) {
   json.key(key).beginArray();
   for (const RegimeFit& fit : fits) {
@@ -66,7 +61,7 @@ void writeExtremes(JsonWriter& json, const ShownPairs& pairs, int firstMonth) {
 void writePeaks(JsonWriter& json, const std::vector<ShownPeak>& peaks) {
   json.key("peaks").beginArray();
   for (const ShownPeak& peak : peaks) {
-    json.beginObject().member("time", milliseconds(peak.second)).member("observed", peak.observed);
+    json.beginObject().member("time", epochMilliseconds(peak.second)).member("observed", peak.observed);
     json.member("simulated", peak.simulated).member("percent", peak.percent);
     json.member("hoursLater", peak.hoursLater).endObject();
   }
@@ -76,7 +71,7 @@ void writePeaks(JsonWriter& json, const std::vector<ShownPeak>& peaks) {
 void writeResiduals(JsonWriter& json, const ResidualViews& residuals) {
   json.key("residuals").beginObject().member("n", residuals.all.count).member("mean", residuals.all.mean);
   json.member("standardDeviation", residuals.all.standardDeviation).key("months").beginArray();
-  for (const std::int64_t second : residuals.months) json.integer(milliseconds(second));
+  for (const std::int64_t second : residuals.months) json.integer(epochMilliseconds(second));
   json.endArray().key("monthMeans").numbers(residuals.monthMeans, Digits::drawn).key("byMonth").beginArray();
   for (const SampleSummary& month : residuals.byMonth) {
     json.numbers(std::vector<double>(month.quantiles.begin(), month.quantiles.end()), Digits::drawn);

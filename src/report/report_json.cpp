@@ -20,13 +20,6 @@ namespace {
 using Digits = JsonWriter::Digits;
 
 constexpr int kFormat = 1;
-constexpr std::int64_t kMilliseconds = 1000;
-
-/// Milliseconds since 1970.
-std::int64_t epochMilliseconds(std::int64_t second) {
-  constexpr std::int64_t kEpoch = dayNumber(1970, 1, 1) * 86400;
-  return (second - kEpoch) * kMilliseconds;
-}
 
 /// The times as start and step where they are equidistant, else one by one.
 void writeTimes(JsonWriter& json, const std::vector<std::int64_t>& seconds) {
@@ -38,7 +31,7 @@ void writeTimes(JsonWriter& json, const std::vector<std::int64_t>& seconds) {
       step > 0 && std::adjacent_find(seconds.begin(), seconds.end(),
                                      [step](std::int64_t a, std::int64_t b) { return b - a != step; }) == seconds.end();
   if (isRegular) {
-    json.member("step", step * kMilliseconds);
+    json.member("step", step * 1000);
     return;
   }
   json.key("times").beginArray();

@@ -9,8 +9,6 @@
 
 namespace mirevo {
 
-inline constexpr std::int64_t kSecondsOfDay = 86400;
-
 /// The times at which a shown series has both an observed and a simulated value; one entry per time in each vector.
 struct ShownPairs {
   std::vector<std::int64_t> seconds;  ///< secondNumber(), ascending

@@ -2,6 +2,7 @@
 import { axis, chart, legend, lineEntries, timeZoom, tip, tooltip, type ChartPlan } from '../chart';
 import { timesOf, variableParameters, type Band, type Maybe, type ReportData } from '../data';
 import { count, moment, number, percent } from '../format';
+import { nearest } from '../lines';
 import { finite, histogram, spaced, type Bin } from '../numbers';
 import { logRange } from '../ticks';
 import { judgements } from './search';
@@ -179,17 +180,6 @@ function bandPlan(band: Band, period: [number, number] | null): ChartPlan {
         ...(band.runs ? [count(band.runs[place] ?? 0)] : [])],
     }),
   };
-}
-
-// The place of the time that is closest to one; times are ascending.
-function nearest(times: number[], time: number): number {
-  let [low, high] = [0, times.length - 1];
-  while (high - low > 1) {
-    const middle = (low + high) >> 1;
-    if (times[middle]! <= time) low = middle;
-    else high = middle;
-  }
-  return Math.abs(times[high]! - time) < Math.abs(times[low]! - time) ? high : low;
 }
 
 export function bandSection(data: ReportData): Section | null {

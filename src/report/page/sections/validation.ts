@@ -1,8 +1,9 @@
 // Calibration and validation side by side, and where the periods are in a hydrograph.
-import type { Figures, ReportData, Series } from '../data';
+import type { ReportData, Series } from '../data';
 import { table } from '../dom';
 import { count, number } from '../format';
 import type { Look } from '../look';
+import { kFigures } from './figures';
 import { heading, paragraph, type Section } from './section';
 
 export const kShadedNote = ' Shaded: the evaluation period (grey) and the validation periods (blue); a button zooms to each.';
@@ -38,22 +39,16 @@ function measuresTable(data: ReportData): Node[] {
   ];
 }
 
-const kFigures: [keyof Figures, string, string][] = [
-  ['nse', 'NSE', 'Nash-Sutcliffe efficiency; 1 is perfect'],
-  ['kge', 'KGE', 'Kling-Gupta efficiency (2009); 1 is perfect'],
-  ['pbias', 'Bias (%)', 'positive is too much; 0 is perfect'],
-  ['rmse', 'RMSE', 'root mean square error, in the unit of the series; 0 is perfect'],
-  ['r2', 'r\u00b2', 'square of the correlation; 1 is perfect'],
-  ['n', 'Values', 'compared values in the period'],
-];
+/** Without the parts of KGE. */
+const kColumns = kFigures.filter(([key]) => !key.startsWith('kge') || key === 'kge');
 
 function figuresTable(series: Series): Node[] {
   const rows = (series.periods ?? []).filter(({ best }) => best).map(({ name, best }) =>
-    [name, ...kFigures.map(([key]) => number(best![key], key === 'n' ? 9 : 4))]);
+    [name, ...kColumns.map(([key]) => number(best![key], key === 'n' ? 9 : 4))]);
   if (rows.length === 0) return [];
   return [
     heading(series.measure),
-    table([{ title: `Best evaluation${series.bestNumber == null ? '' : `, ${count(series.bestNumber)}`}` }, ...kFigures.map(([, title, hint]) => ({ title, hint, number: true }))],
+    table([{ title: `Best evaluation${series.bestNumber == null ? '' : `, ${count(series.bestNumber)}`}` }, ...kColumns.map(([, title, hint]) => ({ title, hint, number: true }))],
       rows, `Figures of ${series.measure} in each period`),
   ];
 }
