@@ -1,9 +1,11 @@
 #pragma once
 
+#include <memory>
 #include <optional>
 #include <string>
 #include <vector>
 
+#include "measures/instruction_file.h"
 #include "measures/kept_steps.h"
 #include "measures/objective_functions.h"
 #include "measures/output_measure.h"
@@ -19,6 +21,7 @@ struct ModelDescription {
   std::vector<ParameterFileItem> parameterFiles;
   std::vector<OutputMeasure> measures;
   std::string measureFile;  ///< output-measure file; empty when no measure is of interface type 1
+  std::shared_ptr<const InstructionFile> instructions = {};  ///< where its numbers are; null: in free format
   EvaluationPeriod period;
   std::vector<ValidationPeriod> validationPeriods;
   double minimumCoverage = 0.0;  ///< share of the first successful run's pairs below which a run fails

@@ -255,7 +255,8 @@ std::optional<EvaluationFailure> OutputReader::readMeasures(const OutputFiles& f
     if (const std::string tooLarge = faultOfSize(files.measureFile, usualNumbers_); !tooLarge.empty()) {
       reason = fmt::format("{}: {}", files.measureFile, tooLarge);
     } else {
-      file = readMeasureFile(files.measureFile, numbersNeeded_, reason, series_.watch());
+      file =
+          readMeasureFile(files.measureFile, numbersNeeded_, reason, series_.watch(), description_.instructions.get());
     }
     if (!file) return failureOf(Kind::resultsNotReadable, std::move(reason));
     written = std::move(*file);

@@ -10,6 +10,7 @@
 #include "common/take_text.h"
 #include "common/text.h"
 #include "common/utf8.h"
+#include "measures/instruction_file.h"
 
 namespace mirevo {
 namespace {
@@ -116,14 +117,17 @@ std::optional<MeasureFile> parseMeasureFile(const std::string& sourceName, std::
 }
 
 std::optional<MeasureFile> readMeasureFile(const std::string& fileName, std::size_t neededCount, std::string& reason,
-                                           ReadingWatch& watch) {
+                                           ReadingWatch& watch, const InstructionFile* instructions) {
   std::string systemReason;
   const std::optional<std::string> content = readTextFile(fileName, systemReason, watch);
   if (!content) {
     reason = fileName + ": " + systemReason;
     return std::nullopt;
   }
-  return parseMeasureFile(fileName, *content, neededCount, reason, &watch);
+  if (instructions == nullptr) return parseMeasureFile(fileName, *content, neededCount, reason, &watch);
+  auto numbers = instructions->read(fileName, *content, reason, &watch);
+  if (!numbers) return std::nullopt;
+  return MeasureFile{*std::move(numbers), endsLine(*content)};
 }
 
 }  // namespace mirevo

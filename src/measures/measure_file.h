@@ -8,6 +8,7 @@
 
 namespace mirevo {
 
+class InstructionFile;
 class ReadingWatch;
 
 /// What a model wrote to an output-measure file.
@@ -20,9 +21,9 @@ struct MeasureFile {
 /// `#` comments to the end of the line. Empty, with line and cause in `reason`, when it cannot be read, when something
 /// in it is not a number, and when it could as well be meant with decimal commas: if each of its words is a number then
 /// (`0,153`), and they are at least `neededCount`, the number of the last that is used; and when the time of `watch` is
-/// over.
+/// over. With `instructions`, the numbers that these read, in their order.
 std::optional<MeasureFile> readMeasureFile(const std::string& fileName, std::size_t neededCount, std::string& reason,
-                                           ReadingWatch& watch);
+                                           ReadingWatch& watch, const InstructionFile* instructions = nullptr);
 /// The same for content in memory; `sourceName` is used in `reason`, `watch` may be null.
 std::optional<MeasureFile> parseMeasureFile(const std::string& sourceName, std::string_view content,
                                             std::size_t neededCount, std::string& reason,

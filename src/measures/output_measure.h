@@ -52,7 +52,8 @@ struct SeriesReference {
 struct OutputMeasure {
   std::string name;
   InterfaceType interfaceType = InterfaceType::timeSeries;
-  std::int32_t measurementNo = 1;  ///< which number of the output-measure file, from 1
+  std::int32_t measurementNo = 1;    ///< which number of the output-measure file, from 1
+  std::string measurementName = {};  ///< its name in the instruction file; empty: it is told by the number
   StatisticType statisticType = StatisticType::mean;
   ValueTransformation transformation = ValueTransformation::none;
   std::optional<double> epsilon;  ///< added to the values before a logarithm, inverse or power; empty: of the default

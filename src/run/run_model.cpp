@@ -19,6 +19,7 @@ ModelDescription describeModel(const RunConfig& config) {
   model.parameterFiles = config.parameterFiles;
   model.measures = config.measures;
   if (config.readsMeasureFile()) model.measureFile = config.measureFile;
+  model.instructions = config.instructions;
   model.period = config.period;
   model.validationPeriods = config.validationPeriods;
   model.minimumCoverage = config.minimumCoverage;

@@ -104,6 +104,23 @@ TEST_F(ModelRunTest, ReadingResultsHoldsTheTimeLimitAndIsCancelled) {
   EXPECT_THROW(EvaluationTest::evaluate(makeEvaluator(launcher_, 1, 9), {2.0}), RunCancelled);
 }
 
+TEST_F(ModelRunTest, NumbersOfAListingAreFoundByInstructions) {
+  std::string reason;
+  const auto instructions = InstructionFile::parse("i.ins", "pif ~\n~RMS~ !rms! ~bias~ !bias!\n", reason);
+  description_.measures[0].interfaceType = InterfaceType::measureFile;
+  description_.measures[0].measurementNo = 2;
+  description_.measureFile = folder_ / "base/out/listing.txt";
+  description_.instructions = std::make_shared<const InstructionFile>(instructions.value());
+  folder_.write("base/out/keep", "");
+  makeRunner(launcher_, 1);
+  writes("out/listing.txt", "A model\nRMS 7.5 bias -8.5\n");
+  EXPECT_THAT(evaluate(2.0).measureValues, ElementsAre(-8.5));
+  writes("out/listing.txt", "A model\nRMS 7.5m and that is all\n");
+  EXPECT_EQ(evaluate(2.0).failure->reason,
+            folder_ / "run_Process1/out/listing.txt" +
+                ":2:5: expected a number, found \"7.5m\" (the number \"rms\" at i.ins:2:7)");
+}
+
 TEST_F(ModelRunTest, MeasureFileValuesAreTakenByTheirNumber) {
   description_.measures[0].interfaceType = InterfaceType::measureFile;
   description_.measures[0].measurementNo = 2;

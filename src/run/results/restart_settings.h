@@ -28,7 +28,8 @@ struct RestartSettings {
   std::vector<EarlierSearch> searches;
 };
 
-/// The settings of this run. Reads the files that the setup names as batch, template, observation and initial sample.
+/// The settings of this run. Reads the files that the setup names as batch, template, observation, instruction and
+/// initial sample.
 RestartSettings restartSettings(const RunConfig& config);
 
 std::string formatRestartSettings(const RestartSettings& settings);

@@ -379,6 +379,10 @@ const SettingSection<OutputMeasure>& measureSection() {
                               .meaning = "Which number of the output-measure file; used with interface type 1.",
                               .checkOrder = 1}),
                          [](const Measure& measure) { return validateMeasurementNumber(measure); }),
+        setting<&Measure::measurementName>({.name = "Measurement_Name",
+                                            .defaultValue = "''",
+                                            .meaning = "The name of the number in the instruction file of the "
+                                                       "output-measure file, in place of its number."}),
         choice<Measure>(
             [](Measure& measure, const SetupValue& value) {
               const auto* code = std::get_if<std::int32_t>(&value);
@@ -570,11 +574,17 @@ const SettingSection<RunConfig>& measureFileSection() {
        "always",
        "The file from which measures of interface type 1 take their numbers.",
        {setting<&RunConfig::measureFile>(
-           {.name = "File_Name",
-            .type = KeywordType::fileName,
-            .defaultValue = "''",
-            .meaning = "In or below the base folder; required where a measure has interface type 1, otherwise "
-                       "without effect."})}}};
+            {.name = "File_Name",
+             .type = KeywordType::fileName,
+             .defaultValue = "''",
+             .meaning = "In or below the base folder; required where a measure has interface type 1, otherwise "
+                        "without effect."}),
+        setting<&RunConfig::instructionFile>(
+            {.name = "Instruction_File",
+             .type = KeywordType::fileName,
+             .defaultValue = "''",
+             .meaning = "A file (`pif`) that says where in the output-measure file the numbers are. Without it, the "
+                        "file has numbers alone."})}}};
   return section;
 }
 

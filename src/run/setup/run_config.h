@@ -5,6 +5,7 @@
 #include <string>
 #include <vector>
 
+#include "measures/instruction_file.h"
 #include "measures/objective_functions.h"
 #include "measures/output_measure.h"
 #include "measures/validation_period.h"
@@ -46,7 +47,9 @@ struct RunConfig {
   AggregationMethod aggregationMethod = AggregationMethod::none;
   double minimumCoverage = 0.0;  ///< share of the first successful run's pairs below which a model run fails
   std::vector<OutputMeasure> measures;
-  std::string measureFile;  ///< may be given though no measure reads it
+  std::string measureFile;                              ///< may be given though no measure reads it
+  std::string instructionFile;                          ///< where its numbers are; empty: in free format
+  std::shared_ptr<const InstructionFile> instructions;  ///< its content
   std::vector<ObjectiveFunction> objectives;
   std::vector<SavedOutputFile> savedOutputFiles;
 

@@ -106,6 +106,8 @@ class SetupReader final {
   void readSavedFiles();
   void readSimultaneousSimulations();
   void readMeasureFile();
+  void readInstructions(const SetupSection& section);
+  void findMeasurement(const SetupSection& section, OutputMeasure& measure) const;
   void requireScales(bool hasInitialSample) const;
 
   SetupFile& file_;
@@ -403,6 +405,60 @@ void SetupReader::readMeasureFile() {
     section.refuse("Error: File containing output measures not defined", "File_Name",
                    "expected the name of a file, since an output measure has Interface_Type = 1");
   }
+  readInstructions(section);
+}
+
+/// Where the numbers of the output-measure file are, and the numbers of the measures that name them.
+void SetupReader::readInstructions(const SetupSection& section) {
+  if (!config_.instructionFile.empty()) {
+    std::string reason;
+    const auto text = readTextFile(config_.instructionFile, reason);
+    if (!text) {
+      section.refuse("Error: Unable to open instruction file", "Instruction_File",
+                     fmt::format("{}: {}", config_.instructionFile, reason));
+    }
+    auto instructions = InstructionFile::parse(config_.instructionFile, *text, reason);
+    if (!instructions) section.refuse("Error: Invalid instruction file", "Instruction_File", reason);
+    config_.instructions = std::make_shared<const InstructionFile>(*std::move(instructions));
+  }
+  for (std::size_t i = 0; i < config_.measures.size(); ++i) {
+    OutputMeasure& measure = config_.measures[i];
+    if (measure.interfaceType == InterfaceType::measureFile) {
+      findMeasurement(sections_.measures[i], measure);
+    } else if (!measure.measurementName.empty()) {
+      sections_.measures[i].warn("Measurement_Name", "has no effect with Interface_Type = 0");
+    }
+  }
+}
+
+/// Which number of the output-measure file a measure is.
+void SetupReader::findMeasurement(const SetupSection& section, OutputMeasure& measure) const {
+  const std::string message = "Error: Measurement No. invalid for output measure " + measure.name;
+  const InstructionFile* const instructions = config_.instructions.get();
+  const std::string_view name = trim(measure.measurementName);
+  if (instructions == nullptr) {
+    if (name.empty()) return;
+    section.refuse(message, "Measurement_Name",
+                   "expected MeasurementNo, or Instruction_File in OUTPUT_MEASURE_FILE, of which this would be a name");
+  }
+  const std::vector<std::string>& names = instructions->names();
+  if (name.empty()) {
+    if (static_cast<std::size_t>(measure.measurementNo) <= names.size()) return;
+    section.refuse(message, "MeasurementNo",
+                   fmt::format("expected 1 to {}, since so many numbers are read by {}, found {}", names.size(),
+                               config_.instructionFile, measure.measurementNo));
+  }
+  if (section.isWritten("MeasurementNo")) {
+    section.refuse(message, "Measurement_Name", "expected this or MeasurementNo, found both");
+  }
+  const auto place = instructions->placeOf(name);
+  if (!place) {
+    const auto nearest = nearestName(name, names);
+    section.refuse(message, "Measurement_Name",
+                   fmt::format("expected a name in {}, found {}{}", config_.instructionFile, quotedForMessage(name),
+                               nearest ? fmt::format(", did you mean {}?", *nearest) : ""));
+  }
+  measure.measurementNo = static_cast<std::int32_t>(*place) + 1;
 }
 
 }  // namespace

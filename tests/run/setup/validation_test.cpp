@@ -20,8 +20,11 @@ using ValidationTest = SetupFixture;
 TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
   folder_.write("Setup.SH", "#!/bin/sh\n");
   folder_.write("model/mistyped.tpl", "!\n!Depht!\n");
+  folder_.write("two.ins", "pif ~\nl1 !head_1! !head_2!\n");
+  folder_.write("no.ins", "pif ~\nl1 !head_1!\nx !head_2!\n");
+  const std::string instructed = "'model/measures.txt' => 'model/measures.txt'\nInstruction_File = 'two.ins'";
   // The first line behind "Error: ", whole, and what the lines below it hold.
-  const std::tuple<const char*, std::string, const char*> cases[] = {
+  const std::tuple<std::string, std::string, const char*> cases[] = {
       // The model and its files
       {"TqSEKdxListItemCount = 1\n      [SIMBATCHITEM_1] => 0\n      [SIMBATCHITEM_1]",
        "No model simulation sequence defined", "setup.kdx:6:30: TqSEKdxListItemCount: expected 1 or more, found 0"},
@@ -144,6 +147,17 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
       {"'model/measures.txt' => ''", "File containing output measures not defined", "Interface_Type = 1"},
       {"'model/measures.txt' => '/tmp/measures.txt'", "The file /tmp/measures.txt is not located in the base folder ",
        ""},
+      {"'model/measures.txt' => 'model/measures.txt'\nInstruction_File = 'none.ins'", "Unable to open instruction file",
+       "none.ins: No such file"},
+      {"'model/measures.txt' => 'model/measures.txt'\nInstruction_File = 'no.ins'", "Invalid instruction file",
+       "no.ins:3:1: expected a line to begin with a marker"},
+      {instructed, "Measurement No. invalid for output measure Written", "two.ins, found 3"},
+      {instructed + " & MeasurementNo = 3 => Measurement_Name = 'Head_3'",
+       "Measurement No. invalid for output measure Written", "two.ins, found \"Head_3\", did you mean head_1?"},
+      {instructed + " & MeasurementNo = 3 => Measurement_Name = 'head_2'\nMeasurementNo = 2",
+       "Measurement No. invalid for output measure Written", "expected this or MeasurementNo, found both"},
+      {"MeasurementNo = 3 => Measurement_Name = 'head_2'", "Measurement No. invalid for output measure Written",
+       "or Instruction_File in OUTPUT_MEASURE_FILE"},
       // Tasks
       {"Option = 2 => 0 & TqSEKdxListItemCount = 1\n      [SCENARIO_1] => 0\n      [SCENARIO_1]",
        "No scenario runs defined", ""},
