@@ -29,6 +29,11 @@ class Reuse : public ::testing::Test {
     folder_.editSetup("Upper_Bound = 5.0\n      Transformation_Type = 0\n      Parameter_Type = 1",
                       "Upper_Bound = 5.0\n      Transformation_Type = 2\n      Parameter_Type = 0");
     folder_.editSetup("    Title =", "    " + choice + "\n    Title =");
+    folder_.editSetup("End_Date = 2001-12-31", "End_Date = 2001-08-31");
+    folder_.editSetup("    [OUTPUT_MEASURES]",
+                      "    [VALIDATION_PERIODS]\n      TqSEKdxListItemCount = 1\n      [VALIDATION_1]\n"
+                      "        Start_Date = 2001-09-01\n        End_Date = 2001-12-01\n      [/VALIDATION_1]\n"
+                      "    [/VALIDATION_PERIODS]\n    [OUTPUT_MEASURES]");
     folder_.editSetup("Standard_Deviation = 0.1\n    [/PARAMETER_2]",
                       "Standard_Deviation = 0.1\n    [/PARAMETER_2]\n    [PARAMETER_3]\n      Mean_Value = 1.5\n"
                       "      Standard_Deviation = 0.5\n    [/PARAMETER_3]");
@@ -69,6 +74,20 @@ class Reuse : public ::testing::Test {
   ModelFolder folder_;
 };
 
+/// What a run has left beside its rows that follows from results alone, by file; for a result file its `#` lines.
+std::map<std::string, std::string> otherResults(const ModelFolder& folder, const std::string& resultFile) {
+  std::map<std::string, std::string> found;
+  for (const char* name : {"_Series.dat", "_Pairs.dat", "_Optimisation_Pairs.dat", "_Failures.dat",
+                           "_Optimisation_Failures.dat", "_Band_1.csv", "_Quantiles.dat", "_SampleCorrelation.dat"}) {
+    if (folder.exists(std::string("basin") + name)) found[name] = folder.read(std::string("basin") + name);
+  }
+  std::istringstream lines(withoutDates(folder.read(resultFile)));
+  for (std::string line; std::getline(lines, line);) {
+    if (line.starts_with('#')) found[resultFile] += line + "\n";
+  }
+  return found;
+}
+
 TEST_F(Reuse, NoSetIsRunTwiceAndTheRowsAreThoseOfModelRuns) {
   const std::tuple<const char*, RunSettings, int> cases[] = {
       {"SCE", {.algorithm = 0, .maxEvaluations = 60}, 0},
@@ -85,6 +104,8 @@ TEST_F(Reuse, NoSetIsRunTwiceAndTheRowsAreThoseOfModelRuns) {
     if (processes > 0 && !mpirunIsInstalled()) continue;
     run(writeSetup(settings, "Reuse_Results = 0"));
     ReadTable expected = table(settings);
+    const auto others = otherResults(folder_, settings.resultFile());
+    EXPECT_GE(others.size(), 3U);
     const int warnings = occurrences(log(), "Warning: ");
     const int finalRuns = settings.option == 2 ? 1 : 0;
     EXPECT_EQ(takeRunCount(), settings.maxEvaluations + finalRuns);
@@ -96,6 +117,7 @@ TEST_F(Reuse, NoSetIsRunTwiceAndTheRowsAreThoseOfModelRuns) {
     const int repeats = takeMarks(found);
     EXPECT_EQ(found.columns, expected.columns);
     EXPECT_EQ(found.rows, expected.rows);
+    EXPECT_EQ(otherResults(folder_, settings.resultFile()), others);
     EXPECT_GT(repeats, 5);
     EXPECT_EQ(takeRunCount(), settings.maxEvaluations + finalRuns - repeats);
     const std::string account = folder_.read(settings.option == 2 ? "basin_Optimisation_Run.dat" : "basin_Run.dat");
