@@ -93,7 +93,7 @@ TEST_F(Reuse, NoSetIsRunTwiceAndTheRowsAreThoseOfModelRuns) {
       {"SCE", {.algorithm = 0, .maxEvaluations = 60}, 0},
       {"SCE, surrogate, MPI", {.algorithm = 0, .usesSurrogate = true, .maxEvaluations = 60}, 4},
       {"PSE, 3 slots, scales", {.algorithm = 1, .aggregation = 1, .maxEvaluations = 60, .slots = 3}, 0},
-      {"PSE, surrogate", {.algorithm = 1, .usesSurrogate = true, .maxEvaluations = 60}, 0},
+      {"PSE, surrogate, MPI", {.algorithm = 1, .usesSurrogate = true, .maxEvaluations = 60}, 3},
       {"DDS", {.algorithm = 2, .maxEvaluations = 60}, 0},
       {"uncertainty, 3 slots", {.option = 3, .maxEvaluations = 60, .slots = 3}, 0},
       // No more failures than may be; they are run again, as a model run may fail by chance.
