@@ -49,6 +49,10 @@ std::string initiatedMessage(std::int64_t number) {
 std::string completedMessage(std::int64_t number, std::string_view outcome) {
   return nameOfEvaluation(number).append(kCompleted).append(outcome);
 }
+std::string repeatMessage(std::int64_t number, std::int64_t original) {
+  return fmt::format("{} repeats No. {}: the model gets the same values, and is not run", nameOfEvaluation(number),
+                     original);
+}
 std::string replayedMessage(std::int64_t number, bool ok) {
   return nameOfEvaluation(number).append(kReplayed).append(ok ? kOk : kFailed);
 }

@@ -57,6 +57,8 @@ inline constexpr std::string_view kModelRunError = "FAILED - model run error";
 std::string nameOfEvaluation(std::int64_t number);
 std::string initiatedMessage(std::int64_t number);
 std::string completedMessage(std::int64_t number, std::string_view outcome);
+/// For an evaluation that has the result of another one of its run; completedMessage() follows.
+std::string repeatMessage(std::int64_t number, std::int64_t original);
 /// For an evaluation whose result was taken from an earlier run.
 std::string replayedMessage(std::int64_t number, bool ok);
 

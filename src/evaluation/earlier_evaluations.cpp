@@ -30,6 +30,11 @@ bool EarlierEvaluations::repeatsRun(int number) const {
   return found != records_.end() && found->second.repeatsRun;
 }
 
+bool EarlierEvaluations::isRepeat(int number) const {
+  const auto found = records_.find(number);
+  return found != records_.end() && found->second.isRepeat;
+}
+
 const std::vector<double>* EarlierEvaluations::measuresOf(int number) const {
   const auto found = records_.find(number);
   return found == records_.end() ? nullptr : &found->second.result.measureValues;

@@ -20,6 +20,7 @@ class EarlierEvaluations final {
   struct Record {
     std::vector<double> parameterValues;  ///< model scale, one per variable parameter
     EvaluationResult result;              ///< complete except for the aggregate
+    bool isRepeat = false;                ///< it had its result from an evaluation before it, without a model run
     bool repeatsRun = false;              ///< the model is run again, for pairs that are lost; the result stays
   };
 
@@ -32,6 +33,8 @@ class EarlierEvaluations final {
   std::optional<EvaluationResult> take(int number, std::span<const double> set);
   /// Whether the evaluation with this number needs a model run before its result is taken.
   bool repeatsRun(int number) const;
+  /// Whether it had its result from an evaluation before it; of one that has not been taken.
+  bool isRepeat(int number) const;
   /// Those of an evaluation that has not been taken; otherwise nullptr.
   const std::vector<double>* measuresOf(int number) const;
 

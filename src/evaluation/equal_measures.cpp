@@ -38,10 +38,11 @@ EqualMeasures::EqualMeasures(SearchSpace space, ParameterFields fields, std::vec
       isSettled_(false) {}
 
 std::optional<std::string> EqualMeasures::findIn(std::span<const ParameterSet> sets,
-                                                 std::span<const EvaluationResult> results, bool isLast) {
+                                                 std::span<const EvaluationResult> results, bool isLast,
+                                                 const std::set<std::size_t>& repeats) {
   if (isSettled_) return std::nullopt;
   for (std::size_t i = 0; i < results.size(); ++i) {
-    if (!results[i].ok()) continue;
+    if (!results[i].ok() || repeats.contains(i)) continue;
     std::vector<double> written = valuesAsWritten(fields_, space_, sets[i]);
     if (++runCount_ == 1) {
       measureValues_ = results[i].measureValues;

@@ -1,6 +1,8 @@
 #pragma once
 
+#include <cstddef>
 #include <optional>
+#include <set>
 #include <span>
 #include <string>
 #include <vector>
@@ -26,9 +28,10 @@ class EqualMeasures final {
 
   /// Takes a complete batch; returns a warning, once in a run, if measures have not changed by the end of a sample,
   /// of twenty successful runs or, with `isLast`, of the run. If others have, it waits until every value has differed
-  /// that the model gets.
+  /// that the model gets. `repeats`: the indices of sets whose result is that of an earlier model run; they count for
+  /// nothing.
   std::optional<std::string> findIn(std::span<const ParameterSet> sets, std::span<const EvaluationResult> results,
-                                    bool isLast);
+                                    bool isLast, const std::set<std::size_t>& repeats = {});
 
  private:
   std::string warning(bool hasOneChanged) const;

@@ -28,8 +28,10 @@ void EvaluationLedger::begin(std::span<const ParameterSet> sets, DispatchMode mo
   if (earlier_ == nullptr || isFinalRun_) return;
   for (std::size_t place = 0; place < sets.size(); ++place) {
     if (earlier_->repeatsRun(numberOf(place))) continue;
+    const bool isRepeat = earlier_->isRepeat(numberOf(place));
     auto result = earlier_->take(numberOf(place), sets[place]);
     if (!result) continue;
+    if (isRepeat) repeats_.insert(place);
     replay(place, std::move(*result));
     if (!earlier_->isRunAgain(numberOf(place))) continue;
     runAgain_.insert(place);
@@ -52,14 +54,35 @@ void EvaluationLedger::store(std::size_t place, EvaluationResult result) {
   const EvaluationResult& stored = results_[place] = std::move(result);
   isFinished_[place] = true;
   ++finishedCount_;
+  for (const int waiting : known_.ended(stored.number, sets_[place], stored.ok())) {
+    returned_.insert(static_cast<std::size_t>(waiting - numberOf(0)));
+  }
   if (!stored.ok()) failedRuns_.countFailure(stored.number, *stored.failure);
 }
 
 std::optional<std::size_t> EvaluationLedger::takeNext() {
+  while (const auto place = placeOfNext()) {
+    const bool isNeeded = isFinalRun_ || runAgain_.contains(*place) || !repeatedMeasures(*place).empty();
+    const auto step = isNeeded ? KnownResults::Step{} : known_.next(numberOf(*place), sets_[*place]);
+    if (step.kind == KnownResults::Step::Kind::wait) continue;
+    if (step.kind == KnownResults::Step::Kind::repeat) {
+      if (observer_.isCancelled()) {  // a search may go on for long without a model run
+        returned_.insert(*place);
+        return std::nullopt;
+      }
+      if (repeat(*place, step.original)) continue;
+    }
+    known_.run(numberOf(*place), sets_[*place]);
+    ++openCount_;
+    return place;
+  }
+  return std::nullopt;
+}
+
+std::optional<std::size_t> EvaluationLedger::placeOfNext() {
   while (next_ < sets_.size() && isFinished_[next_]) ++next_;
   if (next_ == sets_.size() && returned_.empty()) return std::nullopt;
   if (openCount_ > 0 && runComparison_.isAwaited()) return std::nullopt;
-  ++openCount_;
   // In their order: a result may wait for that of a set before it.
   if (returned_.empty() || (next_ < sets_.size() && next_ < *returned_.begin())) return next_++;
   const std::size_t first = *returned_.begin();
@@ -67,7 +90,25 @@ std::optional<std::size_t> EvaluationLedger::takeNext() {
   return first;
 }
 
+/// As a model run would be reported, counted and compared that had the same outcome.
+bool EvaluationLedger::repeat(std::size_t place, int original) {
+  EvaluationResult result;
+  if (!observer_.recall(original, sets_[place], result)) return false;
+  result.number = numberOf(place);
+  result.aggregate = known_.aggregateOf(result);
+  repeats_.insert(place);
+  ComparisonFindings found = runComparison_.take(result, isFinalRun_);
+  observer_.recordRepeat(sets_[place], result, original);
+  observer_.message(progress::repeatMessage(result.number, original));
+  observer_.message(completedText(result));
+  observer_.evaluationFinished(sets_[place], result);
+  tell(std::move(found));
+  store(place, std::move(result));
+  return true;
+}
+
 void EvaluationLedger::putBack(std::size_t place) {
+  known_.putBack(numberOf(place), sets_[place]);
   returned_.insert(place);
   --openCount_;
 }
@@ -163,7 +204,7 @@ void EvaluationLedger::warnOfUnusedObservations(const EvaluationResult& result) 
 }
 
 std::vector<EvaluationResult> EvaluationLedger::end() {
-  if (const auto text = equalMeasures_.findIn(sets_, results_, isFinalRun_)) observer_.urgentWarning(*text);
+  if (const auto text = equalMeasures_.findIn(sets_, results_, isFinalRun_, repeats_)) observer_.urgentWarning(*text);
   return close();
 }
 
@@ -174,6 +215,8 @@ std::vector<EvaluationResult> EvaluationLedger::close() {
   next_ = 0;
   returned_.clear();
   runAgain_.clear();
+  repeats_.clear();
+  known_.closeBatch();
   finishedCount_ = 0;
   openCount_ = 0;
   return std::exchange(results_, {});

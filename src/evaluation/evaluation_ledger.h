@@ -16,6 +16,7 @@
 #include "evaluation/evaluation_result.h"
 #include "evaluation/evaluator.h"
 #include "evaluation/failed_run_policy.h"
+#include "evaluation/known_results.h"
 #include "evaluation/run_comparison.h"
 #include "measures/objective_functions.h"
 
@@ -27,20 +28,22 @@ class EvaluationLedger final {
  public:
   /// `earlier`: evaluations that are not repeated; may be null.
   EvaluationLedger(EvaluationObserver& observer, FailedRunPolicy& failedRuns, EarlierEvaluations* earlier = nullptr,
-                   EqualMeasures equalMeasures = {}, RunComparison runComparison = {})
+                   EqualMeasures equalMeasures = {}, RunComparison runComparison = {}, KnownResults known = {})
       : observer_(observer),
         failedRuns_(failedRuns),
         earlier_(earlier),
         equalMeasures_(std::move(equalMeasures)),
-        runComparison_(std::move(runComparison)) {}
+        runComparison_(std::move(runComparison)),
+        known_(std::move(known)) {}
 
   /// Opens the next batch of the run, when none is open; `place` below is the 0-based index of a set in it.
   /// Sets that an earlier run has evaluated get their results at once, unless `mode` requires their model runs; the
   /// model is run for the output files of those that are EarlierEvaluations::isRunAgain(). Throws
   /// FatalError when the failed-run limit is exceeded, and if an earlier evaluation was of another set.
   void begin(std::span<const ParameterSet> sets, DispatchMode mode);
-  /// The next set, in order, that has no result yet; empty when all are taken, and as long as a model run may become
-  /// the first successful one, by which the next ones are judged.
+  /// The next set, in order, that has no result yet and is to be run; empty when all are taken, as long as a model run
+  /// may become the first successful one, by which the next ones are judged, and when the run was cancelled. Sets that
+  /// have been run get their results on the way, and one that equals a set that is being run waits for it.
   std::optional<std::size_t> takeNext();
   /// Takes a set back that could not be run where it was to be; it is the next one again.
   void putBack(std::size_t place);
@@ -78,6 +81,9 @@ class EvaluationLedger final {
   void warnOfUnusedObservations(const EvaluationResult& result);
   void tell(ComparisonFindings found);
   void replay(std::size_t place, EvaluationResult result);
+  std::optional<std::size_t> placeOfNext();
+  /// Whether the set's result is that of evaluation No. `original`, which it then has.
+  bool repeat(std::size_t place, int original);
   void store(std::size_t place, EvaluationResult result);
   void tellOfRun(const EvaluationResult& result, std::string_view leftBehind);
   void noteUnkeptFiles(std::size_t place, const EvaluationResult& result);
@@ -90,13 +96,16 @@ class EvaluationLedger final {
   EarlierEvaluations* earlier_;
   EqualMeasures equalMeasures_;
   RunComparison runComparison_;
+  KnownResults known_;
   bool isFinalRun_ = false;
   std::vector<ParameterSet> sets_;  ///< the ledger's own: an unfinished batch outlives its caller
   std::vector<EvaluationResult> results_;
-  std::vector<bool> isFinished_;    ///< whether a set has its result
-  std::size_t next_ = 0;            ///< first set that was not taken
-  std::set<std::size_t> returned_;  ///< sets that were taken and put back, and those of runAgain_
+  std::vector<bool> isFinished_;  ///< whether a set has its result
+  std::size_t next_ = 0;          ///< first set that was not taken
+  /// Sets that were taken and put back, those that have waited for an equal one, and those of runAgain_.
+  std::set<std::size_t> returned_;
   std::set<std::size_t> runAgain_;  ///< sets that have a result, whose model is run for its output files alone
+  std::set<std::size_t> repeats_;   ///< sets whose result is that of an earlier model run
   std::size_t finishedCount_ = 0;   ///< sets that have a result
   std::size_t openCount_ = 0;       ///< sets that were taken and have no result
   int evaluationCount_ = 0;         ///< sets of the batches before this one

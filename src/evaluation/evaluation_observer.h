@@ -38,6 +38,21 @@ class EvaluationObserver {
     static_cast<void>(set);
     static_cast<void>(result);
   }
+  /// The same of an evaluation that has the result of an earlier one of the same set, No. `original`, without a model
+  /// run.
+  virtual void recordRepeat(std::span<const double> set, const EvaluationResult& result, int original) {
+    static_cast<void>(original);
+    recordEvaluation(set, result);
+  }
+  /// Reads back what was recorded of a successful evaluation: fills in all that its result then had, except for its
+  /// number and its aggregate. False where that cannot be had, and if the model got other values than it gets with
+  /// `set` (search scale).
+  virtual bool recall(int number, std::span<const double> set, EvaluationResult& result) {
+    static_cast<void>(number);
+    static_cast<void>(set);
+    static_cast<void>(result);
+    return false;
+  }
   /// Writes to disk which output files of a successful model run could not be kept, before recordEvaluation() of it;
   /// none for a run that was made again for such files and has them now.
   virtual void recordUnkeptFiles(int number, std::span<const UnkeptFile> files) {

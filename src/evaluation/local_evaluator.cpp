@@ -14,7 +14,8 @@ LocalEvaluator::LocalEvaluator(ModelRunner& runner, EvaluationObserver& observer
                                int slotCount, EarlierEvaluations* earlier)
     : runner_(runner),
       observer_(observer),
-      ledger_(observer, failedRuns, earlier, runner.equalMeasures(), runner.output().runComparison()),
+      ledger_(observer, failedRuns, earlier, runner.equalMeasures(), runner.output().runComparison(),
+              runner.knownResults()),
       slots_(static_cast<std::size_t>(slotCount)) {
   assert(slotCount > 0);
 }

@@ -208,6 +208,10 @@ EqualMeasures ModelRunner::equalMeasures() const {
           std::move(names), std::move(written), std::move(read)};
 }
 
+KnownResults ModelRunner::knownResults() const {
+  return description_.reusesResults ? KnownResults(parameters_.searchSpace(), aggregator_) : KnownResults();
+}
+
 std::string ModelRunner::slotPath(const std::string& baseFile, int slot) const {
   return launcher_.getProcessFolder(slot) + belowBase(baseFile);
 }

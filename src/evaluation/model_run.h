@@ -11,6 +11,7 @@
 #include "evaluation/equal_measures.h"
 #include "evaluation/evaluation_result.h"
 #include "evaluation/folder_damage.h"
+#include "evaluation/known_results.h"
 #include "evaluation/model_description.h"
 #include "evaluation/output_reader.h"
 #include "evaluation/saved_files.h"
@@ -75,6 +76,8 @@ class ModelRunner final {
   const std::vector<ParameterTemplate>& templates() const { return templates_; }
   /// A check for a model that ignores its parameters, for the evaluations of a run.
   EqualMeasures equalMeasures() const;
+  /// The sets of a run, none of which is run twice; knows nothing if the model is to be run for every set.
+  KnownResults knownResults() const;
   /// What the user should know of links in the model's folder, and templateDoubts() of all templates.
   const std::vector<std::string>& warnings() const { return warnings_; }
 

@@ -32,6 +32,7 @@ struct ReportedRun {
   RunStage stage = RunStage::finished;
   std::string message;  ///< why it stopped; may be empty
   int planned = 0;      ///< evaluations; 0: unknown
+  int repeats = 0;      ///< evaluations that have the result of an earlier one, without a model run
   std::string aggregation;
   std::string algorithm;   ///< the name of the search: "DDS"; empty: none
   std::string surrogate;   ///< empty: none

@@ -54,6 +54,7 @@ void writeRun(JsonWriter& json, const ReportData& data) {
     json.null();
   }
   json.member("failed", std::count(data.evaluations.ok.begin(), data.evaluations.ok.end(), false));
+  if (run.repeats > 0) json.member("repeats", run.repeats);
   json.member("aggregation", run.aggregation).optionalMember("algorithm", run.algorithm);
   json.optionalMember("surrogate", run.surrogate).key("populationSize");
   if (run.populationSize > 0) {

@@ -221,6 +221,7 @@ void ReportBuilder::addEvaluations() {
   for (const ResultRow& row : sources_.results.rows) {
     evaluations.numbers.push_back(row.number);
     evaluations.ok.push_back(row.ok);
+    if (row.repeats.value_or(0) > 0) ++data_.run.repeats;
     const auto addTo = [](std::vector<std::vector<double>>& columns, const std::vector<double>& values, bool isKnown) {
       for (std::size_t i = 0; i < columns.size(); ++i) columns[i].push_back(isKnown ? values[i] : kNaN);
     };

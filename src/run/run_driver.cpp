@@ -411,6 +411,12 @@ void RunDriver::finish(const TaskOutcome& outcome) {
   const int count = reporter_->evaluationCount();
   state_.log.line(count == 1 ? fmt::format("1 model evaluation, {} failed", reporter_->failedCount())
                              : fmt::format("{} model evaluations, {} of them failed", count, reporter_->failedCount()));
+  if (reporter_->repeatCount() > 0) {
+    state_.log.line(
+        fmt::format("{} of them have the result of an earlier evaluation of the same set, without a model "
+                    "run (column Repeats of {})",
+                    reporter_->repeatCount(), fileNameOf(results_->table().path())));
+  }
   if (reporter_->replayedCount() > 0) {
     state_.log.line(fmt::format("{} of them were taken from the earlier run", reporter_->replayedCount()));
   }

@@ -51,6 +51,7 @@ void addFindings(const RunReporter& reporter, const ObjectiveAggregator& aggrega
   if (const auto& best = reporter.best()) record.best = ShownEvaluation{best->number, best->aggregate};
   record.evaluations = reporter.evaluationCount();
   record.failed = reporter.failedCount();
+  record.repeats = reporter.repeatCount();
   record.failuresByKind.clear();
   for (const auto& [kind, count] : reporter.failures().counts()) {
     record.failuresByKind.emplace_back(failureKindKey(kind), count.count);

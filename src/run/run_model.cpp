@@ -29,6 +29,7 @@ ModelDescription describeModel(const RunConfig& config) {
   model.failedFolderPrefix = runFilePath(processFolderPrefix(config), run_files::kFailedFolder);
   model.runsAtOnce = config.simultaneousSimulations;
   model.isForRuns = config.task != nullptr;
+  model.reusesResults = config.reusesResults();
   model.computeExactMeasures = config.usesExactMeasures();
   model.keepSimulatedValues = config.keepsSimulatedValues();
   if (config.task) model.shownRuns = config.task->shownRuns();

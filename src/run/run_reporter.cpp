@@ -1,7 +1,9 @@
 #include "run/run_reporter.h"
 
 #include <algorithm>
+#include <bit>
 #include <cmath>
+#include <cstdint>
 #include <utility>
 
 #include <fmt/core.h>
@@ -95,7 +97,37 @@ std::string RunReporter::absentWarning() const {
 }
 
 void RunReporter::recordEvaluation(std::span<const double> set, const EvaluationResult& result) {
-  const std::vector<double> values = ToModelScale(space_, set);
+  record(ToModelScale(space_, set), result, std::nullopt);
+}
+
+void RunReporter::recordRepeat(std::span<const double> set, const EvaluationResult& result, int original) {
+  record(ToModelScale(space_, set), result, original);
+  ++repeatCount_;
+  if (replayedWithoutPairs_.contains(original)) replayedWithoutPairs_.insert(result.number);
+}
+
+bool RunReporter::recall(int number, std::span<const double> set, EvaluationResult& result) {
+  auto row = results_.rowOf(number);
+  const auto isSame = [](double a, double b) {
+    return std::bit_cast<std::uint64_t>(a) == std::bit_cast<std::uint64_t>(b);
+  };
+  if (!row || !row->ok || !std::ranges::equal(row->parameters, ToModelScale(space_, set), isSame)) return false;
+  result.measureValues = std::move(row->measures);
+  result.objectiveValues = std::move(row->objectives);
+  result.validationValues = std::move(row->validation);
+  if (const auto judged = judged_.find(number); judged != judged_.end()) {
+    result.validationPairs = judged->second.pairs;
+  }
+  if (pairs_ != nullptr && pairs_->has(number)) result.pairs = pairs_->pairs().at(number);
+  if (simulatedValues_ != nullptr) {
+    result.simulatedValues = simulatedValues_->valuesOf(number);
+    result.exactMeasures = simulatedValues_->exactMeasuresOf(number);
+  }
+  return true;
+}
+
+void RunReporter::record(const std::vector<double>& values, const EvaluationResult& result,
+                         std::optional<int> repeats) {
   if (settings_ != nullptr) {
     if (const std::string text = settings_->keep(); !text.empty()) warning(text);
   }
@@ -103,7 +135,9 @@ void RunReporter::recordEvaluation(std::span<const double> set, const Evaluation
   if (!result.ok()) failedRuns_.add(values, result);
   if (result.ok() && simulatedValues_ != nullptr) simulatedValues_->add(values, result);
   if (!result.pairs.empty() && pairs_ != nullptr) pairs_->add(result.number, result.pairs);
-  results_.addRow(resultRow(values, result));
+  ResultRow row = resultRow(values, result);
+  row.repeats = repeats;
+  results_.addRow(std::move(row));
 }
 
 void RunReporter::recordUnkeptFiles(int number, std::span<const UnkeptFile> files) {
@@ -116,7 +150,10 @@ void RunReporter::evaluationFinished(std::span<const double> set, const Evaluati
   count(values, result, dateAndTimeWithZone());
   if (const std::string text = valuesText(result); !text.empty()) state_.log.line("   " + text);
   lastWithPairs_ = {result.number, values};
-  if (searchHasEnded_ && result.ok()) finalRun_ = result.number;
+  if (searchHasEnded_ && result.ok()) {
+    finalRun_ = result.number;
+    compareFinalRun(result);
+  }
   recordSeries(values, result);
   state_.progress.progressStep();
   if (const std::string problem = state_.progress.takeProblem(); !problem.empty()) state_.log.warning(problem);
@@ -125,6 +162,7 @@ void RunReporter::evaluationFinished(std::span<const double> set, const Evaluati
 
 void RunReporter::evaluationReplayed(std::span<const double> set, const EvaluationResult& result) {
   ++replayedCount_;
+  if (results_.isRepeat(result.number)) ++repeatCount_;
   state_.progress.progressReplayed(result.number, result.ok());
   // It is computed again from the objective functions; what the earlier run's file says need not be true.
   if (result.ok() && !std::isnan(result.aggregate)) results_.replaceAggregate(result.number, result.aggregate);
@@ -146,6 +184,16 @@ void RunReporter::evaluationReplayed(std::span<const double> set, const Evaluati
     if (readsSimulatedValues()) passed.simulatedValues = simulatedValues_->valuesOf(result.number);
     recorder_->evaluationPassed(passed, values, best());
   }
+}
+
+void RunReporter::compareFinalRun(const EvaluationResult& result) {
+  const auto row = repeatCount_ > 0 && best() ? results_.rowOf(best()->number) : std::nullopt;
+  if (!row || row->measures == result.measureValues) return;
+  urgentWarning(
+      fmt::format("The final model run has other results than evaluation No. {} of the same set, and {} have the "
+                  "results of earlier "
+                  "ones: a model that draws random numbers needs Reuse_Results = 0 in MIREVO_SIMULATION_OPTION",
+                  best()->number, countText(static_cast<std::size_t>(repeatCount_), "evaluation")));
 }
 
 void RunReporter::runCompared(const ComparisonFindings& found) {

@@ -54,6 +54,8 @@ class RunReporter final : public EvaluationObserver {
   void processesLeft(std::string_view text) override;
   void fileAbsent(const std::string& name, std::string_view text) override;
   void recordEvaluation(std::span<const double> set, const EvaluationResult& result) override;
+  void recordRepeat(std::span<const double> set, const EvaluationResult& result, int original) override;
+  bool recall(int number, std::span<const double> set, EvaluationResult& result) override;
   bool readsSimulatedValues() const override { return simulatedValues_ != nullptr && simulatedValues_->isReadBack(); }
   void recordUnkeptFiles(int number, std::span<const UnkeptFile> files) override;
   void evaluationFinished(std::span<const double> set, const EvaluationResult& result) override;
@@ -97,6 +99,8 @@ class RunReporter final : public EvaluationObserver {
   int failedCount() const { return failedCount_; }
   /// Evaluations whose results were taken from an earlier run.
   int replayedCount() const { return replayedCount_; }
+  /// Evaluations that have the result of an earlier one of the same set.
+  int repeatCount() const { return repeatCount_; }
   const FailureSummary& failures() const { return failures_; }
 
  private:
@@ -112,6 +116,9 @@ class RunReporter final : public EvaluationObserver {
   void considerAsBest(int number, double aggregate, const std::vector<double>& parameterValues,
                       std::string_view foundAt);
   void requireLogWritten() const;
+  /// Results of earlier evaluations are right only for a model that gives them again.
+  void compareFinalRun(const EvaluationResult& result);
+  void record(const std::vector<double>& values, const EvaluationResult& result, std::optional<int> repeats);
   /// The values of a successful evaluation and the best so far, in one line; empty without any.
   std::string valuesText(const EvaluationResult& result) const;
   /// What is said of each evaluation that differs in this, of all its measures.
@@ -136,6 +143,7 @@ class RunReporter final : public EvaluationObserver {
   int evaluationCount_ = 0;
   int failedCount_ = 0;
   int replayedCount_ = 0;
+  int repeatCount_ = 0;
   FailureSummary failures_;
   int firstSuccess_ = 0;  ///< with which others are compared
   /// By kind, evaluation and measure.

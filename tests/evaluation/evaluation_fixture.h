@@ -4,6 +4,7 @@
 #include <map>
 #include <memory>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include <fmt/format.h>
@@ -28,7 +29,21 @@ class RecordingObserver final : public EvaluationObserver {
   void evaluationFinished(std::span<const double> set, const EvaluationResult& result) override {
     events.push_back(fmt::format("record {} a={} {}", result.number, set[0], result.ok() ? "OK" : "FAILED"));
   }
+  void recordEvaluation(std::span<const double> set, const EvaluationResult& result) override {
+    recorded_[result.number] = {set[0], result};
+  }
+  void recordRepeat(std::span<const double> set, const EvaluationResult& result, int original) override {
+    recordEvaluation(set, result);
+    events.push_back(fmt::format("{} repeats {}", result.number, original));
+  }
+  bool recall(int number, std::span<const double> set, EvaluationResult& result) override {
+    const auto found = recorded_.find(number);
+    if (found == recorded_.end() || found->second.first != set[0]) return false;
+    result = found->second.second;
+    return true;
+  }
   void evaluationReplayed(std::span<const double> set, const EvaluationResult& result) override {
+    recordEvaluation(set, result);
     events.push_back(fmt::format("replay {} a={} {}", result.number, set[0], result.ok() ? "OK" : "FAILED"));
   }
   void runCompared(const ComparisonFindings& found) override {
@@ -48,6 +63,9 @@ class RecordingObserver final : public EvaluationObserver {
   std::vector<std::string> pairs;  ///< what is told of them
   bool cancelled = false;
   bool readsValues = false;
+
+ private:
+  std::map<int, std::pair<double, EvaluationResult>> recorded_;  ///< set and result by number
 };
 
 /// A model of one parameter `a` in [0, 10] whose simulated series is the constant a and whose observed one is 1: the

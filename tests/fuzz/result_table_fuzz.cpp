@@ -43,7 +43,8 @@ void requireFirstRowsOf(const ResultTable& whole, const ResultTable& part) {
   for (std::size_t i = 0; i < part.rows.size(); ++i) require(isSame(part.rows[i], whole.rows[i]));
 }
 
-std::string written(const ResultTable& table, const ResultColumns& columns) {
+std::string written(const ResultTable& table, ResultColumns columns) {
+  columns.hasRepeats = !table.rows.empty() && table.rows.front().repeats.has_value();
   std::string text = mirevo::resultHeader(columns) + '\n';
   for (const ResultRow& row : table.rows) text += mirevo::resultRowText(row) + '\n';
   return text;

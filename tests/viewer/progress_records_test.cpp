@@ -18,6 +18,7 @@ constexpr std::string_view kRun =
     "MESSAGBest so far: 1.25 (evaluation 1)\n"
     "COMSPD52.3\nTIMLFT1\nPROGRE1.7\n"
     "MESSAGEvaluation of parameter set No. 2 completed: FAILED - model run error\n"
+    "MESSAGEvaluation of parameter set No. 3 repeats No. 1: the model gets the same values, and is not run\n"
     "MESSAGEvaluation of parameter set No. 3 completed: OK\n"
     "MESSAGBest so far: -2e-05 (evaluation 3, 2026-11-21 05:12:16 +0130)\n"
     "COMSPD2.5\nTIMLFT23\nPROGRE5.0\n"

@@ -24,7 +24,8 @@ RankEvaluator::RankEvaluator(ModelRunner& runner, Job& job, EvaluationObserver& 
     : runner_(runner),
       job_(job),
       observer_(observer),
-      ledger_(observer, failedRuns, earlier, runner.equalMeasures(), runner.output().runComparison()),
+      ledger_(observer, failedRuns, earlier, runner.equalMeasures(), runner.output().runComparison(),
+              runner.knownResults()),
       workers_(static_cast<std::size_t>(job.processCount() - 1)) {}
 
 std::vector<EvaluationResult> RankEvaluator::evaluateParameterSets(std::span<const ParameterSet> sets,

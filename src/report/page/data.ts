@@ -20,6 +20,7 @@ export interface Run {
   evaluations: number;
   planned: number | null;
   failed: number;
+  repeats?: number; // evaluations that have the result of an earlier one, without a model run
   aggregation: string | null;
   algorithm: string | null;
   surrogate: string | null;

@@ -240,6 +240,7 @@ std::map<int, EarlierEvaluations::Record> earlierRecords(EarlierRun& run,
     record.result.measureValues = row.measures;
     record.result.objectiveValues = row.objectives;
     record.result.validationValues = row.validation;
+    record.isRepeat = row.repeats.value_or(0) > 0;
     if (const auto found = pairs.find(row.number); found != pairs.end()) record.result.pairs = found->second;
     if (!row.ok) {
       record.result.failure = failures.at(row.number);

@@ -12,6 +12,7 @@
 #include "common/files.h"
 #include "common/text.h"
 #include "common/utf8.h"
+#include "platform/signals/signal_state.h"
 
 namespace mirevo {
 namespace {
@@ -37,7 +38,8 @@ void ResultFile::open(const std::string& path, std::span<const std::string> head
   earlierAggregates_.clear();
   aggregates_.clear();
   columns_ = columns;
-  std::string content = commentLines(headLines) + resultHeader(columns) + '\n';
+  columns_.hasRepeats = !earlierRows.empty() && earlierRows.front().repeats.has_value();
+  std::string content = commentLines(headLines) + resultHeader(columns_) + '\n';
   headLength_ = std::ssize(content);
   if (earlierRows.empty()) {
     checksums_.open({});  // first: without a head the closing lines would make the table none of a run's
@@ -48,7 +50,8 @@ void ResultFile::open(const std::string& path, std::span<const std::string> head
   std::vector<RowChecksum> checksums;
   for (const ResultRow& row : earlierRows) {
     const std::string line = resultRowText(row);
-    rows_.push_back({row.number, std::ssize(content), std::ssize(line) + 1, checksumOf(line)});
+    rows_.push_back(
+        {row.number, row.repeats.value_or(0) > 0, std::ssize(content), std::ssize(line) + 1, checksumOf(line)});
     checksums.push_back({row.number, rows_.back().checksum});
     earlierAggregates_[row.number] = row.aggregate;
     content += line + '\n';
@@ -60,13 +63,81 @@ void ResultFile::open(const std::string& path, std::span<const std::string> head
   file_.openToContinue(path);
 }
 
-void ResultFile::addRow(const ResultRow& row) {
+void ResultFile::addRow(ResultRow row) {
+  if (row.repeats && !columns_.hasRepeats) addRepeatsColumn();
+  if (columns_.hasRepeats && !row.repeats) row.repeats = 0;
   const std::string line = resultRowText(row);
   const std::uint64_t checksum = checksumOf(line);
   checksums_.add({row.number, checksum});  // before the row, which would be taken for damaged without it
   if (!file_.append(line + '\n')) return;
   const std::int64_t length = std::ssize(line) + 1;
-  rows_.push_back({row.number, file_.size() - length, length, checksum});
+  rows_.push_back({row.number, row.repeats.value_or(0) > 0, file_.size() - length, length, checksum});
+}
+
+/// Rows are nearly in the order of their numbers.
+const ResultFile::Place* ResultFile::placeOf(int number) const {
+  const std::ptrdiff_t count = std::ssize(rows_);
+  const std::ptrdiff_t guess = std::min<std::ptrdiff_t>(number, count) - 1;
+  for (std::ptrdiff_t away = 0; guess - away >= 0 || guess + away < count; ++away) {
+    for (const std::ptrdiff_t i : {guess - away, guess + away}) {
+      if (i >= 0 && i < count && rows_[static_cast<std::size_t>(i)].number == number) {
+        return &rows_[static_cast<std::size_t>(i)];
+      }
+    }
+  }
+  return nullptr;
+}
+
+bool ResultFile::isRepeat(int number) const {
+  const Place* const place = placeOf(number);
+  return place != nullptr && place->isRepeat;
+}
+
+std::optional<ResultRow> ResultFile::rowOf(int number) const {
+  const Place* const place = placeOf(number);
+  if (place == nullptr) return std::nullopt;
+  std::string line(static_cast<std::size_t>(place->length) - 1, '\0');
+  std::string ignored;
+  if (!file_.tryRead(place->offset, line.data(), line.size(), ignored)) return std::nullopt;
+  if (checksumOf(line) != place->checksum) return std::nullopt;
+  return readResultRow(line, columns_);
+}
+
+/// Runs in which no evaluation repeats another, as most over real parameters, have files without it.
+void ResultFile::addRepeatsColumn() {
+  std::string reason;
+  const auto content = readAsWritten(reason);
+  if (!content) fatalError("Error: Unable to write to " + path(), reason);
+  ResultColumns wider = columns_;
+  wider.hasRepeats = true;
+  const std::size_t headerLength = resultHeader(columns_).size() + 1;
+  std::string text = content->substr(0, static_cast<std::size_t>(headLength_) - headerLength);
+  text += resultHeader(wider) + '\n';
+  const std::int64_t headLength = std::ssize(text);
+  std::vector<RowChecksum> checksums = checksumsOfRows();  // until the rows are replaced these are right
+  std::vector<RowChecksum> after;
+  std::vector<Place> places;
+  for (const Place& place : rows_) {
+    const auto line = std::string_view(*content).substr(static_cast<std::size_t>(place.offset),
+                                                        static_cast<std::size_t>(place.length) - 1);
+    const std::string widened = std::string(line) + "\t0";
+    places.push_back({place.number, false, std::ssize(text), std::ssize(widened) + 1, checksumOf(widened)});
+    after.push_back({place.number, places.back().checksum});
+    text += widened + '\n';
+  }
+  text += linesOfOthers(*content);
+  checksums.insert(checksums.end(), after.begin(), after.end());
+  const EndingSignalsHeld held;
+  checksums_.open(checksums);
+  if (!replaceFile(path(), text, reason)) fatalError("Error: Unable to write to " + path(), reason);
+  rows_ = std::move(places);
+  headLength_ = headLength;
+  columns_ = std::move(wider);
+  const bool isKnownToSignals = signalState.resultFileDescriptor == file_.descriptor();
+  if (isKnownToSignals) signalState.resultFileDescriptor = -1;
+  file_.openToContinue(std::string(path()));
+  if (isKnownToSignals) signalState.resultFileDescriptor = file_.descriptor();
+  checksums_.open(after);
 }
 
 void ResultFile::replaceAggregate(int number, double aggregate) {

@@ -29,8 +29,14 @@ class ResultFile final {
   void open(const std::string& path, std::span<const std::string> headLines, const ResultColumns& columns,
             std::span<const ResultRow> earlierRows = {});
 
-  /// Writes one evaluation. Throws FatalError when that fails.
-  void addRow(const ResultRow& row);
+  /// Writes one evaluation. The first one that repeats another gives the file the column that says so: the file is
+  /// replaced with one that has it. Throws FatalError when that fails.
+  void addRow(ResultRow row);
+
+  /// The row of an evaluation, read from the file; empty if there is none, or not as it was written.
+  std::optional<ResultRow> rowOf(int number) const;
+  /// Whether its row says that it repeats another.
+  bool isRepeat(int number) const;
 
   /// Changes the aggregate of a row that is written already, if it is another; takes effect on disk with finish().
   void replaceAggregate(int number, double aggregate);
@@ -49,11 +55,14 @@ class ResultFile final {
   /// Where a row is in the file, in bytes.
   struct Place {
     int number;
+    bool isRepeat;
     std::int64_t offset;
     std::int64_t length;
     std::uint64_t checksum;
   };
   bool isInOrder() const;
+  const Place* placeOf(int number) const;
+  void addRepeatsColumn();
   std::optional<std::string> readAsWritten(std::string& reason) const;
   bool hasRowsAsWritten(std::string_view content, std::string& reason) const;
   std::string settleLine(std::string_view content, Place& place) const;

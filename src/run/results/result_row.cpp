@@ -15,6 +15,7 @@ namespace {
 
 constexpr std::string_view kOk = "OK";
 constexpr std::string_view kFailed = "FAILED";
+constexpr const char* kRepeats = "Repeats";
 
 /// Defines the order of the columns: calls `visit` for each, with its name, or the names for a group of columns. Stops
 /// when it returns false; returns whether all were visited.
@@ -22,7 +23,8 @@ template <class Row, class Columns, class Visit>
 bool visitColumns(Row& row, const Columns& columns, Visit&& visit) {
   return visit(row.number, "Evaluation") && visit(row.ok, "Status") && visit(row.parameters, columns.parameters) &&
          visit(row.measures, columns.measures) && visit(row.objectives, columns.objectives) &&
-         visit(row.aggregate, "Aggregate") && visit(row.validation, columns.validation);
+         visit(row.aggregate, "Aggregate") && visit(row.validation, columns.validation) &&
+         (!columns.hasRepeats || visit(row.repeats, kRepeats));
 }
 
 void addCell(std::string& line, std::string_view cell) {
@@ -34,6 +36,7 @@ void addCell(std::string& line, std::string_view cell) {
 struct FixedHeadings {
   std::set<std::string> names;
   bool operator()(const auto&, const char* name) { return names.insert(name).second; }
+  bool operator()(const std::optional<int>&, const char*) { return true; }
   bool operator()(const std::vector<double>&, const std::vector<std::string>&) { return true; }
 };
 
@@ -46,6 +49,8 @@ struct HeaderWriter {
     addCell(line, name);
     return true;
   }
+  /// It comes to a file that has the others already: a parameter or measure of that name keeps its heading.
+  bool operator()(const std::optional<int>&, const char* name) { return (*this)({}, std::vector<std::string>{name}); }
   bool operator()(const std::vector<double>&, const std::vector<std::string>& names) {
     for (const std::string& name : names) {
       const std::string plain = columnName(name);
@@ -71,6 +76,7 @@ struct RowWriter {
   bool operator()(int number, const char*) { return add(std::to_string(number)); }
   bool operator()(std::same_as<bool> auto ok, const char*) { return add(ok ? kOk : kFailed); }
   bool operator()(double value, const char*) { return add(formatReal(value)); }
+  bool operator()(const std::optional<int>& repeats, const char*) { return add(std::to_string(repeats.value_or(0))); }
   bool operator()(const std::vector<double>& values, const std::vector<std::string>&) {
     for (const double value : values) addCell(line, formatReal(value));
     return true;
@@ -97,6 +103,10 @@ struct RowReader {
     return ok || cell == kFailed;
   }
   bool operator()(double& value, const char*) { return read(value); }
+  bool operator()(std::optional<int>& repeats, const char*) {
+    repeats = parseInteger(next());
+    return repeats && *repeats >= 0;
+  }
   bool operator()(std::vector<double>& values, const std::vector<std::string>& names) {
     values.resize(names.size());
     return std::all_of(values.begin(), values.end(), [this](double& value) { return read(value); });
@@ -152,7 +162,9 @@ std::string resultHeader(const ResultColumns& columns) {
 
 std::string resultRowText(const ResultRow& row) {
   RowWriter writer;
-  visitColumns(row, ResultColumns{}, writer);
+  ResultColumns columns;
+  columns.hasRepeats = row.repeats.has_value();
+  visitColumns(row, columns, writer);
   return writer.line;
 }
 
@@ -164,6 +176,12 @@ bool isResultHeader(std::string_view line) {
   const std::string unnamed = resultHeader({});
   const std::string_view first = std::string_view(unnamed).substr(0, unnamed.find('\t') + 1);
   return line.starts_with(first) && cellCount(line) >= cellCount(unnamed);
+}
+
+ResultColumns withRepeatsOf(std::string_view header, ResultColumns columns) {
+  const std::string_view last = trim(header.substr(header.rfind('\t') + 1));
+  columns.hasRepeats = cellCount(header) == cellCount(headerOf(columns, true)) + 1 && last.starts_with(kRepeats);
+  return columns;
 }
 
 bool hasColumns(std::string_view header, const ResultColumns& columns) {

@@ -19,6 +19,7 @@ struct ResultColumns {
   std::vector<std::string> measures;
   std::vector<std::string> objectives;
   std::vector<std::string> validation = {};  ///< measures in validation periods
+  bool hasRepeats = false;                   ///< the last column says which evaluation a row repeats
 };
 
 /// One evaluation in a result file. result_row.cpp defines its columns, for writing and reading alike.
@@ -30,6 +31,9 @@ struct ResultRow {
   std::vector<double> objectives;
   double aggregate = kFailedRunValue;
   std::vector<double> validation = {};
+  /// The number of the evaluation of the same set whose result this one has, without a model run of its own; 0 for one
+  /// that had its own. Empty in a file without the column, where no evaluation repeats another.
+  std::optional<int> repeats = {};
   std::size_t line = 0;  ///< of a row that was read: the line of its file, from 1
 };
 
@@ -48,6 +52,8 @@ std::string resultRowText(const ResultRow& row);
 std::size_t cellCount(std::string_view line);
 /// Whether the line is the header row of a result file, whatever its columns.
 bool isResultHeader(std::string_view line);
+/// These columns, with that of repeats if the header row has it behind them.
+ResultColumns withRepeatsOf(std::string_view header, ResultColumns columns);
 /// Whether the header row has these columns.
 bool hasColumns(std::string_view header, const ResultColumns& columns);
 /// The row in a line below a header row with these columns; empty for a line that is not a row.

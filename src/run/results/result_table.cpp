@@ -31,8 +31,9 @@ bool takeRow(std::string_view line, std::size_t lineNumber, std::size_t columnCo
 
 }  // namespace
 
-ResultTable readResultTable(std::string_view text, const ResultColumns& columns) {
+ResultTable readResultTable(std::string_view text, const ResultColumns& expected) {
   ResultTable table;
+  ResultColumns columns = expected;
   std::size_t columnCount = 0;
   for (std::size_t lineNumber = 1; !text.empty(); ++lineNumber) {
     const std::size_t end = text.find('\n');
@@ -51,6 +52,7 @@ ResultTable readResultTable(std::string_view text, const ResultColumns& columns)
     } else if (isResultHeader(line)) {
       table.hasHeader = true;
       columnCount = cellCount(line);
+      columns = withRepeatsOf(line, std::move(columns));
       table.hasExpectedCount = columnCount == cellCount(resultHeader(columns));
       table.hasExpectedColumns = hasColumns(line, columns);
     } else {

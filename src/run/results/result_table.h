@@ -24,10 +24,10 @@ struct ResultTable {
   std::set<int> numbersOfUnusable;        ///< which evaluations the others of them are that begin with a number
 };
 
-/// Reads the text of a result file with these columns. A last line without a line end counts as cut off even if it can
-/// be read, since digits of its last number may be missing. Accepts any text; lines that do not belong in a result file
-/// count as unusable.
-ResultTable readResultTable(std::string_view text, const ResultColumns& columns);
+/// Reads the text of a result file with these columns, or these and that of repeats. A last line without a line end
+/// counts as cut off even if it can be read, since digits of its last number may be missing. Accepts any text; lines
+/// that do not belong in a result file count as unusable.
+ResultTable readResultTable(std::string_view text, const ResultColumns& expected);
 
 /// Sorts the rows by number; of several with the same number the first is kept.
 void putInOrder(std::vector<ResultRow>& rows);

@@ -36,6 +36,7 @@ constexpr std::string_view kBest = "bestEvaluation";
 constexpr std::string_view kBestAggregate = "bestAggregate";
 constexpr std::string_view kEvaluations = "evaluations";
 constexpr std::string_view kFailed = "failed";
+constexpr std::string_view kRepeats = "repeats";
 constexpr std::string_view kAnalysed = "analysedEvaluations";
 /// With the key of the kind, or the name of the objective function, behind it.
 constexpr std::string_view kFailedBy = "failed.";
@@ -104,6 +105,7 @@ void takeRow(const std::string& name, const std::string& value, RunRecord& recor
   if (name == key::kBestAggregate) best().aggregate = real();
   if (name == key::kEvaluations) record.evaluations = number();
   if (name == key::kFailed) record.failed = number();
+  if (name == key::kRepeats) record.repeats = number().value_or(0);
   if (name == key::kAnalysed) record.analysed = number();
   if (auto kind = nameBehind(key::kFailedBy, name)) record.failuresByKind.emplace_back(*kind, number().value_or(0));
   if (auto objective = nameBehind(key::kSigma, name)) scaleOf(record, *objective).sigma = real();
@@ -148,6 +150,7 @@ std::string runRecordText(const RunRecord& record, const std::vector<std::string
     if (record.evaluations) rows.addCount(key::kEvaluations, *record.evaluations);
     if (record.failed) rows.addCount(key::kFailed, *record.failed);
     for (const auto& [kind, count] : record.failuresByKind) rows.addCount(joined(key::kFailedBy, kind), count);
+    if (record.repeats > 0) rows.addCount(key::kRepeats, record.repeats);
     if (record.analysed) rows.addCount(key::kAnalysed, *record.analysed);
     for (const RunRecord::Scale& scale : record.scales) {
       rows.add(joined(key::kSigma, scale.objective), scale.sigma);

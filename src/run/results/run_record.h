@@ -43,6 +43,7 @@ struct RunRecord {
   std::optional<ShownEvaluation> best;
   std::optional<int> evaluations;
   std::optional<int> failed;
+  int repeats = 0;  ///< evaluations that have the result of an earlier one, without a model run
   std::vector<std::pair<std::string, int>> failuresByKind;
   /// Of an analysis that did not come to its end, the evaluations of which it gives statistics; without any, nothing.
   std::optional<int> analysed;

@@ -187,6 +187,10 @@ std::vector<double> SimulatedValuesFile::valuesOf(int number) const {
   return columns(std::span(&number, 1), 0, valueCount_);
 }
 
+std::vector<double> SimulatedValuesFile::exactMeasuresOf(int number) const {
+  return columns(std::span(&number, 1), valueCount_, exactMeasureCount_);
+}
+
 std::vector<double> SimulatedValuesFile::columns(std::span<const int> numbers, std::size_t first,
                                                  std::size_t count) const {
   std::vector<double> values(numbers.size() * count);

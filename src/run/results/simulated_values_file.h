@@ -52,6 +52,8 @@ class SimulatedValuesFile final {
   bool isReadBack() const { return isReadBack_; }
   /// The simulated values of an evaluation that was added or taken up. Throws FatalError if they cannot be read.
   std::vector<double> valuesOf(int number) const;
+  /// Its measures in 64 bits.
+  std::vector<double> exactMeasuresOf(int number) const;
   /// Of such evaluations the simulated values from index `first` on, `count` of each; those with the same index side
   /// by side, in the order of `numbers`. Throws FatalError if they cannot be read.
   std::vector<double> columns(std::span<const int> numbers, std::size_t first, std::size_t count) const;

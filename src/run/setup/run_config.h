@@ -60,6 +60,7 @@ struct RunConfig {
   double maxSimulationTime = 0.0;  ///< longest time of a model run, s; 0: no limit
 
   RestartMode restart = RestartMode::startAfresh;
+  bool reuseResults = true;                   ///< as the setup has it, see reusesResults()
   std::int32_t failedRunFolders = 3;          ///< failed model runs whose process folder is kept
   std::vector<ResultSetting> resultSettings;  ///< in reading order; must be unchanged when a run is continued
 
@@ -73,6 +74,9 @@ struct RunConfig {
   bool keepsSimulatedValues() const { return task && task->keepsSimulatedValues(); }
   /// Whether the task uses output measures in 64 bits that differ from those in the rows.
   bool usesExactMeasures() const;
+  /// Whether a set that was run is not run again: its result is known. Files that are kept of every model run, and runs
+  /// that the setup lists one by one, need their model runs.
+  bool reusesResults() const { return reuseResults && savedOutputFiles.empty() && task && !task->runsEverySet(); }
   /// Whether an output measure is of interface type 1.
   bool readsMeasureFile() const;
   /// "Parameter optimisation: Dynamically Dimensioned Search"; "none" without a task.

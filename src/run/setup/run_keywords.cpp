@@ -51,6 +51,16 @@ const SettingSection<RunConfig>& simulationOptionSection() {
                  "1: an interrupted run continues where it was cut off. 2: the same, and failed model runs at its "
                  "end are repeated. 0: earlier results are kept under a numbered name and the run starts afresh.",
              .bearsOnResults = kNotOfResults}),
+        setting<&RunConfig::reuseResults>(
+            {.name = "Reuse_Results",
+             .defaultValue = "1",
+             .meaning =
+                 "1: a set for which the model would get the same values as in an earlier successful evaluation of the "
+                 "run has that result, and the model is not run; such rows are marked in the column `Repeats`. "
+                 "Scenario "
+                 "runs, and runs with `SAVE_OUTPUT_FILES`, run the model for every set. 0: the model is always run, as "
+                 "one that draws random numbers needs it.",
+             .bearsOnResults = kNotOfResults}),
         setting<&RunConfig::failedRunFolders>(
             {.name = "FailedRunFolders",
              .defaultValue = "3",

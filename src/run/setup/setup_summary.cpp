@@ -127,6 +127,15 @@ std::string setupSummary(const RunConfig& config, const SearchSpace& space, std:
   if (config.task) {
     for (const std::string& text : config.task->summaryLines(space)) summary.line("{}", text);
   }
+  if (!config.reuseResults) {
+    summary.line("Reuse of results: none, the model is run for every set");
+  } else if (config.reusesResults()) {
+    summary.line("Reuse of results: a set that was run is not run again");
+  } else if (config.task) {
+    summary.line("Reuse of results: none, {}", config.task->runsEverySet()
+                                                   ? "every listed run is made"
+                                                   : "as output files are kept of every model run");
+  }
   summary.line("Simultaneous simulations: {}{}", config.simultaneousSimulations,
                config.useSingleThread ? ", one thread each" : "");
   return summary.text();

@@ -31,6 +31,8 @@ class ScenarioTask final : public Task {
   std::string description() const override;
   std::vector<std::string> summaryLines(const SearchSpace& space) const override;
   int shownRuns() const override;
+  /// A scenario that is listed twice is meant twice: so it shows whether the model draws random numbers.
+  bool runsEverySet() const override { return true; }
   TaskReport report() const override;
   int plannedEvaluations() const override;
   TaskOutcome run(const TaskContext& context) override;

@@ -154,6 +154,8 @@ class Task {
   virtual SeriesPrecision keptPrecision() const { return SeriesPrecision::single; }
   /// How many of its evaluations, the first ones, are shown with their series one beside another; 0: none.
   virtual int shownRuns() const { return 0; }
+  /// Whether the model is run for every set, even if it was run for an equal one.
+  virtual bool runsEverySet() const { return false; }
   /// Whether it uses the output measures in 64 bits, which the results then must hold.
   virtual bool usesExactMeasures() const { return false; }
   /// Empty if its batches fill several slots.

@@ -122,6 +122,49 @@ TEST_F(ResultFileTest, RowsThatAreTakenUpHaveTheirChecksumsWhateverTheFileHeld) 
   }
 }
 
+TEST_F(ResultFileTest, TheFirstRowThatRepeatsAnotherBringsItsColumn) {
+  open();
+  add(success(2, 1, 1), 4.0);
+  folder_.write("r.dat", folder_.read("r.dat") + "a note of another program");
+  add(failure(1), 3.0);
+  const double parameter = 4.0;
+  ResultRow repeat = resultRow(std::span(&parameter, 1), success(3, 1, 1));
+  repeat.repeats = 2;
+  results_.addRow(repeat);
+  add(success(4, 1, std::nan("")), 5.0);
+  EXPECT_EQ(results_.rowOf(3)->repeats, 2);
+  EXPECT_EQ(results_.rowOf(2)->parameters, std::vector{4.0});
+  EXPECT_TRUE(results_.isRepeat(3) && !results_.isRepeat(2) && !results_.isRepeat(9) && !results_.rowOf(9));
+  EXPECT_EQ(checksums(), 4U);
+  results_.replaceAggregate(4, 2.0);
+  ASSERT_TRUE(results_.finish(std::vector<std::string>{"done"}, reason_)) << reason_;
+  EXPECT_EQ(checksums(), 4U);
+  const std::string_view head = kHeadText.substr(0, kHeadText.size() - 1);
+  EXPECT_EQ(folder_.read("r.dat"), std::string(head) + "\tRepeats\n" +
+                                       "1\tFAILED\t3\t1e+30\t1e+30\t1e+30\t0\n2\tOK\t4\t1\t1\t1\t0\n"
+                                       "3\tOK\t4\t1\t1\t1\t2\n4\tOK\t5\t1\tNaN\t2\t0\n"
+                                       "a note of another program\n# done\n");
+  // A restart takes it up with its column.
+  const ResultTable table = readResultTable(folder_.read("r.dat"), kColumns);
+  ASSERT_EQ(table.rows.size(), 4U);
+  results_.open(path_, kHead, kColumns, table.rows);
+  add(success(5, 1, 1), 6.0);
+  EXPECT_TRUE(results_.isRepeat(3));
+  EXPECT_TRUE(folder_.read("r.dat").ends_with("\n5\tOK\t6\t1\t1\t1\t0\n"));
+  EXPECT_EQ(checksums(), 5U);
+}
+
+TEST_F(ResultFileTest, TheColumnOfRepeatsIsRefusedWhereTheFileIsNotAsItWasWritten) {
+  open();
+  add(success(1, 1, 1), 1.0);
+  folder_.write("r.dat", folder_.read("r.dat").replace(kHeadText.size(), 1, "7"));
+  EXPECT_FALSE(results_.rowOf(1).has_value());
+  const double parameter = 1.0;
+  ResultRow repeat = resultRow(std::span(&parameter, 1), success(2, 1, 1));
+  repeat.repeats = 1;
+  EXPECT_THAT(refusalOf([&] { results_.addRow(repeat); }), testing::HasSubstr("another program has changed it"));
+}
+
 TEST_F(ResultFileTest, RowsStayWhereTheyAreWhenTheyCannotBePutInOrder) {
   std::filesystem::create_directories((folder_ / "r.dat.tmp/in the way"));
   open();

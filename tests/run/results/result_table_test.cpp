@@ -53,6 +53,12 @@ TEST(ResultTable, OtherColumnsAreToldFromNone) {
     EXPECT_EQ(table.unusableLines, 1U);
   }
   EXPECT_TRUE(readResultTable("Evaluation\tStatus\tX1 \t RMSE\tAggregate\n", kTableColumns).hasExpectedColumns);
+  // A column more is that of repeats or none of the run's; one of that name before it keeps its own heading.
+  const std::string wider = "Evaluation\tStatus\tX1\tRMSE\tAggregate\t";
+  EXPECT_EQ(readResultTable(wider + "Repeats\n2\tOK\t1\t2\t3\t1\n", kTableColumns).rows.at(0).repeats, 1);
+  EXPECT_EQ(readResultTable(wider + "Repeats\n2\tOK\t1\t2\t3\t-1\n", kTableColumns).unusableLines, 1U);
+  EXPECT_FALSE(readResultTable(wider + "Others\n2\tOK\t1\t2\t3\t1\n", kTableColumns).hasExpectedCount);
+  EXPECT_EQ(resultHeader({{"Repeats"}, {}, {}, {}, true}), "Evaluation\tStatus\tRepeats\tAggregate\tRepeats (2)");
 }
 
 TEST(ResultTable, DamagedRowsAreCountedAndPassedOver) {

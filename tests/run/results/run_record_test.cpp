@@ -29,6 +29,7 @@ void complete(RunRecord& record) {
   record.best = ShownEvaluation{17, 0.1 + 0.2};
   record.evaluations = 31;
   record.failed = 3;
+  record.repeats = 12;
   record.analysed = 28;
   record.failuresByKind = {{"exitCode", 2}, {"timedOut", 1}};
   record.scales = {{"flow # 1", 0.1, -2.0}, {"", 1e-300, 0.0}};
@@ -53,6 +54,7 @@ TEST(RunRecord, ReadsBackAsItWasWritten) {
   EXPECT_EQ(read->warnings, record.warnings);
   EXPECT_EQ(read->failuresByKind, record.failuresByKind);
   EXPECT_EQ(read->analysed, 28);
+  EXPECT_EQ(read->repeats, 12);
   EXPECT_EQ(read->scales.at(0).objective, "flow # 1");
   EXPECT_EQ(read->stage, RunStage::failed);
   EXPECT_EQ(read->message, record.message);

@@ -185,6 +185,7 @@ TEST_F(SetupReaderTest, EchoesEverySectionAndValueInReadingOrder) {
                               "  Option = 2 ('optimisation')\n"
                               "  Title = 'Upper catchment'\n"
                               "  Restart = 0 ('no') (default)\n"
+                              "  Reuse_Results = 1 ('yes') (default)\n"
                               "  FailedRunFolders = 3 (default)\n"
                               "  Report = 1 ('yes') (default)\n"
                               "[MIREVO_SIMULATION_OPTION/SIMBATCH]\n"

@@ -38,6 +38,7 @@ TEST_F(SetupSummaryTest, SaysWhatTheRunIsAboutToDo) {
       "Model evaluations planned: 500 and a final model run\n"
       "Surrogate model: quadratic polynomial fitted to the 60 nearest sets, chooses one of 4 proposals; loops without "
       "it: 2\n"
+      "Reuse of results: none, as output files are kept of every model run\n"
       "Simultaneous simulations: 4");
 }
 

@@ -74,6 +74,9 @@ function findings(data: ReportData): Finding[] {
     const rest = near.length > 6 ? ` and ${near.length - 6} more` : '';
     found.push({ kind: 'warning', text: `Best value near a bound: ${names}${rest}. A wider bound may fit better.` });
   }
+  if (run.repeats) {
+    found.push({ kind: 'plain', text: `${counted(run.repeats, 'evaluation')} (${percent(run.repeats / run.evaluations)}) repeated an earlier parameter set and took its result, without a model run.` });
+  }
   if (run.evaluations === 0) found.push({ kind: 'warning', text: 'No evaluation has been recorded.' });
   else if (run.failed === run.evaluations) found.push({ kind: 'warning', text: 'Every evaluation failed.' });
   else if (run.failed > 0) {
