@@ -1,5 +1,6 @@
 /// Prints the tables of docs/algorithms/search-comparison.md. Usage: search_comparison [table], where the table is
-/// "success", "budget", "complexes" or "surrogate"; without an argument all of them. Trials have the seeds 1, 2, 3,
+/// "success", "budget", "complexes", "candidates" or "surrogate"; without an argument all of them. Trials have the
+/// seeds 1, 2, 3,
 /// ..., so that the figures are the same every time.
 
 #include <algorithm>
@@ -115,6 +116,7 @@ TestFunction functionNamed(const std::string& name) {
 }
 
 constexpr int kTrials = 100;
+constexpr int kCandidateTrials = 400;  // the median of Rosenbrock 10-D scatters much
 constexpr int kSurrogateTrials = 20;
 constexpr int kSuccessBudget = 25000;
 constexpr int kSurrogateBudget = 6000;
@@ -133,6 +135,7 @@ struct Setting {
   bool stopsAtTarget = false;
   int extraPoints = 0;               ///< points per complex beyond n + 1; 0 means n, that is 2n + 1 points
   bool goesOnWhenConverged = false;  ///< until the budget is used up, whatever the stopping tests say
+  DdsSettings dds = {};
 };
 
 struct Outcome {
@@ -191,7 +194,7 @@ Outcome runTrial(const TestFunction& function, const Setting& setting, int seed)
   } else if (setting.method == Method::pse) {
     search = std::make_unique<Pse>(PseSettings{setting.complexes * (2 * n + 1)}, SimplexSettings{n + 1}, problem);
   } else {
-    search = std::make_unique<Dds>(DdsSettings{}, setting.budget, false, bounds, evaluator, random);
+    search = std::make_unique<Dds>(setting.dds, setting.budget, false, bounds, evaluator, random);
   }
   if (search->initialise() != kSearchOk) return {};
   const auto isOver = [&] {
@@ -224,16 +227,17 @@ std::string successText(const std::vector<Outcome>& outcomes) {
   return successes == 0 ? "0/–" : fmt::format("{}/{:.0f}", successes, sum / successes);
 }
 
-std::string meanAndMedianText(const std::vector<Outcome>& outcomes) {
+double medianOf(const std::vector<Outcome>& outcomes) {
   std::vector<double> values;
-  double sum = 0.0;
-  for (const Outcome& outcome : outcomes) {
-    values.push_back(outcome.best);
-    sum += outcome.best;
-  }
+  for (const Outcome& outcome : outcomes) values.push_back(outcome.best);
   std::sort(values.begin(), values.end());
-  const double median = 0.5 * (values[(values.size() - 1) / 2] + values[values.size() / 2]);
-  return fmt::format("{:.3g} / {:.3g}", sum / static_cast<double>(values.size()), median);
+  return 0.5 * (values[(values.size() - 1) / 2] + values[values.size() / 2]);
+}
+
+std::string meanAndMedianText(const std::vector<Outcome>& outcomes) {
+  double sum = 0.0;
+  for (const Outcome& outcome : outcomes) sum += outcome.best;
+  return fmt::format("{:.3g} / {:.3g}", sum / static_cast<double>(outcomes.size()), medianOf(outcomes));
 }
 
 void printSuccess() {
@@ -290,6 +294,30 @@ void printSmallComplexes() {
   }
 }
 
+/// In as many evaluations as a serial search, and in k times as many, which k slots make in the same time.
+void printCandidates() {
+  constexpr int kSerialBudget = 1000;
+  for (const bool isEqualTime : {false, true}) {
+    for (const bool waitsForAll : {false, true}) {
+      fmt::print("\nMedian best value over {} trials, {} evaluations, centred optimum, {}\n\n", kCandidateTrials,
+                 isEqualTime ? fmt::format("{} k", kSerialBudget) : std::to_string(kSerialBudget),
+                 waitsForAll ? "steps of k candidates" : "k candidates under way");
+      fmt::print("| function | DDS (k = 1) | k = 2 | k = 4 | k = 8 | k = 16 |\n|---|---|---|---|---|---|\n");
+      for (const std::string name : {"Ackley 10-D", "Griewank 10-D", "Rastrigin 10-D", "Rosenbrock 10-D"}) {
+        const TestFunction function = functionNamed(name);
+        fmt::print("| {} |", name);
+        for (const int k : {1, 2, 4, 8, 16}) {
+          const Setting setting{.method = Method::dds,
+                                .budget = isEqualTime ? k * kSerialBudget : kSerialBudget,
+                                .dds = {.candidates = k, .waitsForAll = waitsForAll}};
+          fmt::print(" {:.3g} |", medianOf(runTrials(function, setting, false, kCandidateTrials)));
+        }
+        fmt::print("\n");
+      }
+    }
+  }
+}
+
 void printSurrogate() {
   fmt::print("\nSuccesses of {} / mean evaluations of the successful, shifted optimum, 4 complexes\n\n",
              kSurrogateTrials);
@@ -319,6 +347,7 @@ int main(int argc, char** argv) {
   if (table.empty() || table == "success") mirevo::printSuccess();
   if (table.empty() || table == "budget") mirevo::printBudget();
   if (table.empty() || table == "complexes") mirevo::printSmallComplexes();
+  if (table.empty() || table == "candidates") mirevo::printCandidates();
   if (table.empty() || table == "surrogate") mirevo::printSurrogate();
   return 0;
 }

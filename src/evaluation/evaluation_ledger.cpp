@@ -1,5 +1,8 @@
 #include "evaluation/evaluation_ledger.h"
 
+#include <algorithm>
+#include <cstddef>
+#include <iterator>
 #include <utility>
 
 #include <fmt/core.h>
@@ -20,16 +23,17 @@ std::string completedText(const EvaluationResult& result) {
 
 }  // namespace
 
-void EvaluationLedger::begin(std::span<const ParameterSet> sets, DispatchMode mode) {
-  sets_.assign(sets.begin(), sets.end());
-  results_.assign(sets.size(), {});
-  isFinished_.assign(sets.size(), false);
+void EvaluationLedger::open(std::span<const ParameterSet> sets, DispatchMode mode) {
+  const std::size_t first = endPlace();
+  sets_.insert(sets_.end(), sets.begin(), sets.end());
+  results_.resize(sets_.size());
+  isFinished_.resize(sets_.size(), false);
   isFinalRun_ = mode == DispatchMode::finalRun;
   if (earlier_ == nullptr || isFinalRun_) return;
-  for (std::size_t place = 0; place < sets.size(); ++place) {
+  for (std::size_t place = first; place < endPlace(); ++place) {
     if (earlier_->repeatsRun(numberOf(place))) continue;
     const bool isRepeat = earlier_->isRepeat(numberOf(place));
-    auto result = earlier_->take(numberOf(place), sets[place]);
+    auto result = earlier_->take(numberOf(place), set(place));
     if (!result) continue;
     if (isRepeat) repeats_.insert(place);
     replay(place, std::move(*result));
@@ -41,7 +45,7 @@ void EvaluationLedger::begin(std::span<const ParameterSet> sets, DispatchMode mo
 
 void EvaluationLedger::replay(std::size_t place, EvaluationResult result) {
   ComparisonFindings found = runComparison_.take(result, isFinalRun_);
-  observer_.evaluationReplayed(sets_[place], result);
+  observer_.evaluationReplayed(set(place), result);
   tell(std::move(found));
   store(place, std::move(result));
 }
@@ -51,11 +55,11 @@ void EvaluationLedger::store(std::size_t place, EvaluationResult result) {
   // Not needed any more; the batch keeps its results until it is complete.
   result.shownSeries = {};
   if (observer_.readsSimulatedValues()) result.simulatedValues = std::vector<double>();  // {} would keep its memory
-  const EvaluationResult& stored = results_[place] = std::move(result);
-  isFinished_[place] = true;
+  const EvaluationResult& stored = results_[indexOf(place)] = std::move(result);
+  isFinished_[indexOf(place)] = true;
   ++finishedCount_;
-  for (const int waiting : known_.ended(stored.number, sets_[place], stored.ok())) {
-    returned_.insert(static_cast<std::size_t>(waiting - numberOf(0)));
+  for (const int waiting : known_.ended(stored.number, set(place), stored.ok())) {
+    returned_.insert(placeOf(waiting));
   }
   if (!stored.ok()) failedRuns_.countFailure(stored.number, *stored.failure);
 }
@@ -63,7 +67,7 @@ void EvaluationLedger::store(std::size_t place, EvaluationResult result) {
 std::optional<std::size_t> EvaluationLedger::takeNext() {
   while (const auto place = placeOfNext()) {
     const bool isNeeded = isFinalRun_ || runAgain_.contains(*place) || !repeatedMeasures(*place).empty();
-    const auto step = isNeeded ? KnownResults::Step{} : known_.next(numberOf(*place), sets_[*place]);
+    const auto step = isNeeded ? KnownResults::Step{} : known_.next(numberOf(*place), set(*place));
     if (step.kind == KnownResults::Step::Kind::wait) continue;
     if (step.kind == KnownResults::Step::Kind::repeat) {
       if (observer_.isCancelled()) {  // a search may go on for long without a model run
@@ -72,19 +76,19 @@ std::optional<std::size_t> EvaluationLedger::takeNext() {
       }
       if (repeat(*place, step.original)) continue;
     }
-    known_.run(numberOf(*place), sets_[*place]);
-    ++openCount_;
+    known_.run(numberOf(*place), set(*place));
+    ++runningCount_;
     return place;
   }
   return std::nullopt;
 }
 
 std::optional<std::size_t> EvaluationLedger::placeOfNext() {
-  while (next_ < sets_.size() && isFinished_[next_]) ++next_;
-  if (next_ == sets_.size() && returned_.empty()) return std::nullopt;
-  if (openCount_ > 0 && runComparison_.isAwaited()) return std::nullopt;
+  while (next_ < endPlace() && isFinished_[indexOf(next_)]) ++next_;
+  if (next_ == endPlace() && returned_.empty()) return std::nullopt;
+  if (runningCount_ > 0 && runComparison_.isAwaited()) return std::nullopt;
   // In their order: a result may wait for that of a set before it.
-  if (returned_.empty() || (next_ < sets_.size() && next_ < *returned_.begin())) return next_++;
+  if (returned_.empty() || (next_ < endPlace() && next_ < *returned_.begin())) return next_++;
   const std::size_t first = *returned_.begin();
   returned_.erase(returned_.begin());
   return first;
@@ -93,28 +97,28 @@ std::optional<std::size_t> EvaluationLedger::placeOfNext() {
 /// As a model run would be reported, counted and compared that had the same outcome.
 bool EvaluationLedger::repeat(std::size_t place, int original) {
   EvaluationResult result;
-  if (!observer_.recall(original, sets_[place], result)) return false;
+  if (!observer_.recall(original, set(place), result)) return false;
   result.number = numberOf(place);
   result.aggregate = known_.aggregateOf(result);
   repeats_.insert(place);
   ComparisonFindings found = runComparison_.take(result, isFinalRun_);
-  observer_.recordRepeat(sets_[place], result, original);
+  observer_.recordRepeat(set(place), result, original);
   observer_.message(progress::repeatMessage(result.number, original));
   observer_.message(completedText(result));
-  observer_.evaluationFinished(sets_[place], result);
+  observer_.evaluationFinished(set(place), result);
   tell(std::move(found));
   store(place, std::move(result));
   return true;
 }
 
 void EvaluationLedger::putBack(std::size_t place) {
-  known_.putBack(numberOf(place), sets_[place]);
+  known_.putBack(numberOf(place), set(place));
   returned_.insert(place);
-  --openCount_;
+  --runningCount_;
 }
 
 std::vector<double> EvaluationLedger::repeatedMeasures(std::size_t place) const {
-  if (runAgain_.contains(place)) return results_[place].measureValues;
+  if (runAgain_.contains(place)) return results_[indexOf(place)].measureValues;
   if (earlier_ == nullptr) return {};
   const auto* measures = earlier_->measuresOf(numberOf(place));
   return measures == nullptr ? std::vector<double>() : *measures;
@@ -126,21 +130,21 @@ void EvaluationLedger::markInitiated(std::size_t place) {
 
 void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::string_view leftBehind) {
   result.number = numberOf(place);
-  --openCount_;
+  --runningCount_;
   tellOfRun(result, leftBehind);
   if (runAgain_.erase(place) > 0) {
     observer_.message(completedText(result));
     return finishAgain(place, result);
   }
   noteUnkeptFiles(place, result);
-  if (auto known = earlier_ == nullptr ? std::nullopt : earlier_->take(result.number, sets_[place])) {
+  if (auto known = earlier_ == nullptr ? std::nullopt : earlier_->take(result.number, set(place))) {
     observer_.message(completedText(result));
     return finishRepeated(place, std::move(*known), std::move(result));
   }
   ComparisonFindings found = runComparison_.take(result, isFinalRun_);
-  observer_.recordEvaluation(sets_[place], result);
+  observer_.recordEvaluation(set(place), result);
   observer_.message(completedText(result));
-  observer_.evaluationFinished(sets_[place], result);
+  observer_.evaluationFinished(set(place), result);
   tell(std::move(found));
   store(place, std::move(result));
 }
@@ -178,7 +182,7 @@ void EvaluationLedger::finishRepeated(std::size_t place, EvaluationResult known,
 void EvaluationLedger::finishAgain(std::size_t place, const EvaluationResult& result) {
   const std::string again = progress::nameOfEvaluation(result.number) + " was made again for its output files: ";
   if (!result.ok()) return observer_.warning(again + "the model run failed: " + result.failure->reason);
-  if (result.measureValues != results_[place].measureValues) {
+  if (result.measureValues != results_[indexOf(place)].measureValues) {
     return observer_.warning(again + "the model run has other results than before, and its files are not kept");
   }
   observer_.recordUnkeptFiles(result.number, result.unkeptFiles);
@@ -204,30 +208,60 @@ void EvaluationLedger::warnOfUnusedObservations(const EvaluationResult& result) 
 }
 
 std::vector<EvaluationResult> EvaluationLedger::end() {
-  if (const auto text = equalMeasures_.findIn(sets_, results_, isFinalRun_, repeats_)) observer_.urgentWarning(*text);
+  if (const auto text = equalMeasures_.findIn(sets_, results_, isFinalRun_, repeatsAmong(sets_.size())))
+    observer_.urgentWarning(*text);
   return close();
 }
 
+/// Their indices in the first `count` of the open sets.
+std::set<std::size_t> EvaluationLedger::repeatsAmong(std::size_t count) const {
+  std::set<std::size_t> indices;
+  for (const std::size_t place : repeats_) {
+    if (place < closedCount_ + count) indices.insert(place - closedCount_);
+  }
+  return indices;
+}
+
+EvaluationResult EvaluationLedger::takeFirst() {
+  const std::size_t first = indexOf(closedCount_);
+  // One at a time, so that what it finds does not depend on what else has ended.
+  const auto text = equalMeasures_.findIn({&sets_[first], 1}, {&results_[first], 1}, isFinalRun_, repeatsAmong(1));
+  repeats_.erase(closedCount_);
+  if (text) observer_.urgentWarning(*text);
+  EvaluationResult result = std::move(results_[first]);
+  sets_[first] = {};
+  ++closedCount_;
+  --finishedCount_;
+  next_ = std::max(next_, closedCount_);
+  // The sets closed are dropped together, so that each of many costs the same.
+  if (const auto count = static_cast<std::ptrdiff_t>(first + 1); 2 * count > std::ssize(sets_)) {
+    sets_.erase(sets_.begin(), sets_.begin() + count);
+    results_.erase(results_.begin(), results_.begin() + count);
+    isFinished_.erase(isFinished_.begin(), isFinished_.begin() + count);
+    start_ = closedCount_;
+  }
+  return result;
+}
+
 std::vector<EvaluationResult> EvaluationLedger::close() {
-  evaluationCount_ += static_cast<int>(sets_.size());
+  start_ = closedCount_ = next_ = endPlace();
   sets_ = {};
   isFinished_.clear();
-  next_ = 0;
   returned_.clear();
   runAgain_.clear();
   repeats_.clear();
   known_.closeBatch();
   finishedCount_ = 0;
-  openCount_ = 0;
+  runningCount_ = 0;
   return std::exchange(results_, {});
 }
 
 UnfinishedBatch EvaluationLedger::takeUnfinished() {
   UnfinishedBatch unfinished;
-  for (std::size_t place = 0; place < sets_.size(); ++place) {
-    if (!isFinished_[place]) continue;
-    unfinished.sets.push_back(std::move(sets_[place]));
-    unfinished.results.push_back(std::move(results_[place]));
+  for (std::size_t place = closedCount_; place < endPlace(); ++place) {
+    if (!isFinished_[indexOf(place)]) continue;
+    unfinished.sets.push_back(std::move(sets_[indexOf(place)]));
+    unfinished.results.push_back(std::move(results_[indexOf(place)]));
   }
   close();
   return unfinished;

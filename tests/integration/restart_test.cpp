@@ -73,6 +73,39 @@ fi)");
   }
 }
 
+/// Models end in another order than they began, and rows are missing before others when the run is killed.
+TEST_F(Restart, CandidatesUnderWayMakeTheSameRowsOnAnyNumberOfSlotsAndAfterAKill) {
+  folder_.useScript(R"(n=$(tr -dc 1-9 <parameters.txt | tail -c 1); sleep 0.0${n:-0}
+if test -e ../tickets; then
+  n=1; while ! mkdir ../tickets/$n; do n=$((n + 1)); done 2>/dev/null
+  while test $n = 13; do sleep 0.05; done
+fi)");
+  writeSetup({.maxEvaluations = 60});
+  folder_.editSetup("Algorithm_Type = 2", "Algorithm_Type = 'PDDS'");
+  const std::string text = folder_.read("basin.kdx");
+  run();
+  const std::string expected = results();
+  for (const int slots : {2, 5}) {
+    removeResults();
+    folder_.write("basin.kdx", text);
+    folder_.editSetup("NoSimultaneousSim = 1", fmt::format("NoSimultaneousSim = {}", slots));
+    std::filesystem::create_directory(folder_ / "tickets");
+    RunningProgram program({setup_});
+    // The thirteenth model run does not end, and the five others of the six that are under way do.
+    ASSERT_TRUE(waitUntil([&] { return std::ssize(readDataTable(folder_.read(resultFile_)).rows) >= 16; }));
+    program.send(SIGKILL);
+    program.wait();
+    std::filesystem::remove_all(folder_ / "tickets");
+    run();
+    EXPECT_EQ(results(), expected) << slots << log();
+    EXPECT_THAT(log(), HasSubstr("evaluations are taken from"));
+  }
+  if (!mpirunIsInstalled()) GTEST_SKIP() << "no mpirun";
+  removeResults();
+  EXPECT_EQ(startJob(4, {setup_}).wait().exitCode, 0);
+  EXPECT_EQ(results(), expected) << log();
+}
+
 TEST_F(Restart, AFinishedRunIsWalkedThroughAndEndsWithTheSameFile) {
   writeSetup({.option = 3, .maxEvaluations = 20});
   run();

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <iterator>
 #include <utility>
 
 #include <fmt/format.h>
@@ -86,21 +87,58 @@ SearchStatus Dds::initialise() {
 }
 
 SearchStatus Dds::advance() {
-  if (isTerminated()) return kSearchOk;
-  if (summary_.evaluationCount == 0) return kDdsInvalidInput;
-  const double probability = ddsInclusionProbability(summary_.evaluationCount + 1, maxEvaluations_);
+  if (isTerminated() || summary_.evaluationCount >= lastEvaluation_) return kSearchOk;
+  if (summary_.evaluationCount == 0 || settings_.candidates < 1) return kDdsInvalidInput;
+  const int last = std::min(maxEvaluations_, lastEvaluation_);
+  const auto madeCount = [this] { return summary_.evaluationCount + static_cast<int>(underWay_.size()); };
+  while (std::ssize(underWay_) < settings_.candidates && madeCount() < last) submitCandidate();
+  do {
+    takeFirstCandidate();
+  } while (settings_.waitsForAll && !underWay_.empty());
+  ++summary_.loopCount;
+  checkBudget();
+  return kSearchOk;
+}
+
+void Dds::submitCandidate() {
+  const int evaluation = summary_.evaluationCount + static_cast<int>(underWay_.size()) + 1;
+  ParameterSet set =
+      merged_ ? feasible_.drawnBack(*std::exchange(merged_, {}), {summary_.best}) : drawCandidate(evaluation);
+  underWay_.push_back({std::move(set), summary_.best, summary_.bestResult.aggregate});
+  evaluator_.submit({&underWay_.back().set, 1});
+}
+
+ParameterSet Dds::drawCandidate(int evaluation) {
+  const double probability = ddsInclusionProbability(evaluation, maxEvaluations_);
   ParameterSet firstDraw;
-  const ParameterSet candidate = ddsCandidate(
+  ParameterSet candidate = ddsCandidate(
       summary_.best, bounds_, settings_.perturbation, probability, [this] { return random_.next(); }, feasible_,
       &firstDraw);
   noteSteps(firstDraw, candidate);
-  std::vector<EvaluationResult> results = evaluator_.evaluateParameterSets({&candidate, 1}, DispatchMode::task);
+  return candidate;
+}
+
+void Dds::takeFirstCandidate() {
+  EvaluationResult result = evaluator_.awaitFirst();
+  const Candidate candidate = std::move(underWay_.front());
+  underWay_.pop_front();
   ++summary_.evaluationCount;
-  ++summary_.loopCount;
+  mergeImprovements(candidate, result.aggregate);
   // Deliberately also for an equal value: the search can then drift along a plateau.
-  if (isNotGreater(results.front().aggregate, summary_.bestResult.aggregate)) takeAsBest(candidate, results.front());
-  checkBudget();
-  return kSearchOk;
+  if (isNotGreater(result.aggregate, summary_.bestResult.aggregate)) takeAsBest(candidate.set, result);
+}
+
+void Dds::mergeImprovements(const Candidate& candidate, double value) {
+  if (!isLess(value, candidate.originValue) || candidate.origin == summary_.best) return;
+  const bool isBetter = isNotGreater(value, summary_.bestResult.aggregate);
+  const ParameterSet& better = isBetter ? candidate.set : summary_.best;
+  const ParameterSet& other = isBetter && !merged_ ? summary_.best : candidate.set;
+  // One that unites improvements already gets this one, too.
+  ParameterSet united = merged_ ? *merged_ : better;
+  for (std::size_t j = 0; j < united.size(); ++j) {
+    if (united[j] == candidate.origin[j]) united[j] = other[j];
+  }
+  if (united != (merged_ ? *merged_ : better)) merged_ = std::move(united);
 }
 
 std::vector<ParameterSet> Dds::startPoints() {
@@ -211,20 +249,18 @@ BoundSection DdsMethod::section() {
       {"OPTIMISATION_ALGORITHM/DDS_CONTROL_PARAMETERS",
        "when `Algorithm_Type` is 2",
        "Dynamically Dimensioned Search.",
-       {setting<DdsMethod>(
-           [](auto& m) -> auto& { return m.settings.perturbation; },
-           {.name = "Perturbation_Parameter",
-            .defaultValue = "0.2",
-            .range = kFraction,
-            .refusal = "Error: Perturbation parameter in DDS algorithm invalid",
-            .meaning = "Neighbourhood size r: standard deviation of a perturbation as a fraction of the "
-                       "parameter's range."})}}};
+       {setting<DdsMethod>([](auto& m) -> auto& { return m.settings.perturbation; },
+                           {.name = kPerturbationKeyword,
+                            .defaultValue = "0.2",
+                            .range = kFraction,
+                            .refusal = "Error: Perturbation parameter in DDS algorithm invalid",
+                            .meaning = std::string(kPerturbationMeaning)})}}};
   return {section, *this};
 }
 
 std::vector<SearchDoubt> DdsMethod::doubts() const {
   if (settings.perturbation > 0.0) return {};
-  return {{"Perturbation_Parameter", "0 perturbs nothing: every candidate is the best start set again"}};
+  return {{kPerturbationKeyword, "0 perturbs nothing: every candidate is the best start set again"}};
 }
 
 std::string_view DdsMethod::budgetRefusal() const {
@@ -244,19 +280,25 @@ RaisedBudget DdsMethod::raiseBudget(const SearchHistory& history, const Stopping
   const int startPoints = isFirst ? static_cast<int>(sampleSize(sample, history.budget)) : 1;
   const int last = std::min(history.budget, std::max(history.evaluations, before + startPoints));
   raised.earlier = EarlierSearch{history.budget, last};
+  // Behind a missing evaluation there may be candidates that were under way with it.
+  if (last < history.budget) raised.keptEvaluations = last;
   raised.note = fmt::format(
-      "Max_No_Evaluations was raised from {} to {}: as the probabilities of Dynamically Dimensioned Search depend on "
-      "it, a new search starts from the best of the first {} evaluations, which are kept",
-      history.budget, stopping.maxEvaluations, last);
+      "Max_No_Evaluations was raised from {} to {}: as the probabilities of {} depend on it, a new search starts from "
+      "the best of the first {} evaluations, which are kept",
+      history.budget, stopping.maxEvaluations, facts().longName, last);
   return raised;
 }
 
-std::unique_ptr<SearchAlgorithm> DdsMethod::make(SearchProblem problem) const {
+std::unique_ptr<Dds> DdsMethod::makeDds(SearchProblem problem) const {
   const bool continues = !problem.earlierSearches.empty();
   const int made = continues ? problem.earlierSearches.back().lastEvaluation : 0;
   return std::make_unique<Dds>(settings, problem.stopping.maxEvaluations - made,
                                continues || problem.initialSample.includeInitialParameters, std::move(problem.bounds),
                                problem.evaluator, problem.random, std::move(problem.feasibility));
+}
+
+std::unique_ptr<SearchAlgorithm> DdsMethod::make(SearchProblem problem) const {
+  return makeDds(std::move(problem));
 }
 
 SearchSummary DdsMethod::run(SearchProblem problem, const PeriodicStep& /*periodicStep*/) const {
@@ -265,7 +307,9 @@ SearchSummary DdsMethod::run(SearchProblem problem, const PeriodicStep& /*period
   int made = 0;
   for (const EarlierSearch& search : earlier) {
     problem.stopping.maxEvaluations = search.maxEvaluations;
-    problem.bounds.initial = runSearch(*make(problem), facts().name.name, {}, search.lastEvaluation - made).best;
+    const auto dds = makeDds(problem);
+    dds->endAfter(search.lastEvaluation - made);
+    problem.bounds.initial = runSearch(*dds, facts().name.name, {}, search.lastEvaluation - made).best;
     problem.earlierSearches.push_back(search);
     made = search.lastEvaluation;
   }

@@ -1,7 +1,11 @@
 #pragma once
 
+#include <deque>
 #include <functional>
+#include <limits>
+#include <optional>
 #include <span>
+#include <string_view>
 
 #include "algorithms/numbers/uniform_generator.h"
 #include "algorithms/searches/feasible_points.h"
@@ -13,10 +17,15 @@ namespace mirevo {
 
 struct DdsSettings {
   double perturbation = 0.2;  ///< neighbourhood size r, as a fraction of a parameter's range
+  int candidates = 1;         ///< that may be under way at a time
+  bool waitsForAll = true;    ///< before it makes further candidates; otherwise for the first of those under way
 };
 
-/// Dynamically Dimensioned Search after Tolson and Shoemaker (2007), doi:10.1029/2005WR004723. One candidate at a time:
-/// the best set with some parameters perturbed, ever fewer of them as the budget is used up.
+/// Dynamically Dimensioned Search after Tolson and Shoemaker (2007), doi:10.1029/2005WR004723. A candidate is the best
+/// set with some parameters perturbed, ever fewer of them as the budget is used up. With several candidates at a time
+/// they are accepted in the order in which they were made, whatever the order in which their evaluations end: what a
+/// candidate is made from depends on those accepted before it was made, never on time. If two candidates improve the
+/// same set, the next one unites them.
 ///
 /// Differs from the paper in four ways: the start points count as evaluations in the inclusion probability, a point
 /// reflected past the opposite bound is set to the bound that it violated first, of the two normal deviates that the
@@ -32,13 +41,28 @@ class Dds final : public SearchAlgorithm {
   /// kDdsInvalidInput, without an evaluation, for a budget below 1 and for bounds that are missing, crossed or not
   /// finite.
   SearchStatus initialise() override;
-  /// Makes and evaluates one candidate. Does nothing once terminated; kDdsInvalidInput before initialise().
+  /// Makes candidates until as many are under way as may be, and accepts or rejects the first of them, or all. Does
+  /// nothing once terminated; kDdsInvalidInput before initialise().
   SearchStatus advance() override;
+  /// To be called before initialise(): makes no candidate after this evaluation, as if it had been cut off there.
+  void endAfter(int evaluations) { lastEvaluation_ = evaluations; }
   bool isTerminated() const override { return !summary_.terminationMessage.empty(); }
   const SearchSummary& summary() const override { return summary_; }
 
  private:
+  struct Candidate {
+    ParameterSet set;
+    ParameterSet origin;  ///< the best set from which it was made
+    double originValue = 0.0;
+  };
+
   std::vector<ParameterSet> startPoints();
+  ParameterSet drawCandidate(int evaluation);
+  void submitCandidate();
+  void takeFirstCandidate();
+  /// If the candidate improved the set from which it was made, and another one has replaced that since: puts both
+  /// improvements into the next candidate.
+  void mergeImprovements(const Candidate& candidate, double value);
   void takeAsBest(const ParameterSet& set, EvaluationResult& result);
   void checkBudget();
   void noteSteps(const ParameterSet& firstDraw, const ParameterSet& candidate);
@@ -52,6 +76,9 @@ class Dds final : public SearchAlgorithm {
   UniformGenerator& random_;
   FeasiblePoints feasible_;
   SearchSummary summary_;
+  std::deque<Candidate> underWay_;      ///< submitted and not accepted or rejected, in order
+  std::optional<ParameterSet> merged_;  ///< the next candidate, if it is not to be drawn
+  int lastEvaluation_ = std::numeric_limits<int>::max();
   std::vector<int> replacedSteps_;    ///< by parameter, how many of its steps could not be run and were replaced
   std::vector<double> largestSteps_;  ///< by parameter, from the best set to a candidate
 };
@@ -82,8 +109,12 @@ ParameterSet ddsCandidate(std::span<const double> best, const SearchBounds& boun
                           double inclusionProbability, const DeviateSource& deviate, FeasiblePoints& feasible,
                           ParameterSet* firstDraw = nullptr);
 
+inline constexpr std::string_view kPerturbationKeyword = "Perturbation_Parameter";
+inline constexpr std::string_view kPerturbationMeaning =
+    "Neighbourhood size r: standard deviation of a perturbation as a fraction of the parameter's range.";
+
 /// DDS as a setup selects it.
-class DdsMethod final : public SearchMethod {
+class DdsMethod : public SearchMethod {
  public:
   const SearchFacts& facts() const override;
   BoundSection section() override;
@@ -102,6 +133,9 @@ class DdsMethod final : public SearchMethod {
   SearchSummary run(SearchProblem problem, const PeriodicStep& periodicStep) const override;
 
   DdsSettings settings;
+
+ private:
+  std::unique_ptr<Dds> makeDds(SearchProblem problem) const;
 };
 
 }  // namespace mirevo

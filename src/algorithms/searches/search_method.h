@@ -86,6 +86,8 @@ class SearchMethod {
   virtual std::int64_t sampleSize(const InitialSampleSettings& /*sample*/, int /*budget*/) const {
     return populationSize();
   }
+  /// Most evaluations at a time, whatever the number of slots; 0: a limit is not known.
+  virtual std::int64_t mostAtOnce() const { return 0; }
   /// Least number of evaluations in a loop.
   virtual double evaluationsPerLoop() const { return 1.0; }
   /// Number of loops after the initial sample until `sets` parameter sets are evaluated, before a surrogate model is

@@ -236,11 +236,9 @@ std::optional<SettingRefusal> validateProcessCount(const RunConfig& config) {
   if (config.usesMpiWorkers || !config.task || config.simultaneousSimulations <= 1) return std::nullopt;
   const std::optional<OneSlotOnly> only = config.task->needsOneSlot();
   if (!only) return std::nullopt;
-  return SettingRefusal{
-      std::string(only->refusal), kSlotsKeyword,
-      fmt::format("expected 1 with this {}, found {}{}{}", only->keyword, config.simultaneousSimulations,
-                  only->atOnceUnderMpi.empty() ? "" : "; a job of several processes (MPI) runs at once: ",
-                  only->atOnceUnderMpi)};
+  return SettingRefusal{std::string(only->refusal), kSlotsKeyword,
+                        fmt::format("expected 1 with this {}, found {}; several model runs at a time: {}",
+                                    only->keyword, config.simultaneousSimulations, only->advice)};
 }
 
 }  // namespace mirevo

@@ -134,6 +134,18 @@ void logBestSet(const TaskContext& context, const ParameterSet& best, const Eval
   context.log.line(fmt::format("Aggregate: {}", formatReal(result.aggregate)));
 }
 
+/// "Algorithm_Type = 'PSE' or 'PDDS', or ..."
+std::string waysToRunSeveral() {
+  std::string text = fmt::format("{} = '{}'", kAlgorithmKeyword, searchesWith(&SearchFacts::runsInParallel, "' or '"));
+  for (const auto& search : searchMethods().all()) {
+    const SearchFacts& facts = search->facts();
+    if (facts.runsAtOnceUnderMpi.empty()) continue;
+    text += fmt::format(", or a job of several processes (MPI), in which {} runs {} at once", facts.name.name,
+                        facts.runsAtOnceUnderMpi);
+  }
+  return text;
+}
+
 void warnOffGrid(const ModelParameter& parameter, std::span<const double> values, const SetupSection& section) {
   const auto isOff = [&parameter](double value) { return !isOnGrid(parameter, value); };
   const auto first = std::find_if(values.begin(), values.end(), isOff);
@@ -333,7 +345,12 @@ std::vector<std::string> OptimisationTask::summaryLines(const SearchSpace& space
 std::optional<OneSlotOnly> OptimisationTask::needsOneSlot() const {
   if (method->facts().runsInParallel) return std::nullopt;
   return OneSlotOnly{"Error: Use Population Simplex Evolution algorithm for application with multiple processors",
-                     kAlgorithmKeyword, method->facts().runsAtOnceUnderMpi};
+                     kAlgorithmKeyword, waysToRunSeveral()};
+}
+
+int OptimisationTask::mostAtOnce() const {
+  const std::int64_t most = method->mostAtOnce();
+  return most == 0 ? plannedEvaluations() : static_cast<int>(std::min<std::int64_t>(most, plannedEvaluations()));
 }
 
 /// Warns of sets of the initial sample that are not drawn and cannot be run.

@@ -23,6 +23,7 @@ class OptimisationTask final : public Task {
   std::string description() const override;
   std::vector<std::string> summaryLines(const SearchSpace& space) const override;
   int plannedEvaluations() const override { return stopping.maxEvaluations; }
+  int mostAtOnce() const override;
   bool hasFinalRun() const override { return true; }
   bool drawsRandomNumbers() const override { return true; }
   std::optional<OneSlotOnly> needsOneSlot() const override;

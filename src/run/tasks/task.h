@@ -106,9 +106,9 @@ struct TaskReport {
 
 /// Why more than one slot is refused.
 struct OneSlotOnly {
-  std::string_view refusal;              ///< the fixed text
-  std::string_view keyword;              ///< the keyword whose value requires one slot
-  std::string_view atOnceUnderMpi = {};  ///< what the task runs at once under MPI all the same; empty: nothing
+  std::string_view refusal;  ///< the fixed text
+  std::string_view keyword;  ///< the keyword whose value requires one slot
+  std::string advice;        ///< what makes several model runs at a time in its place
 };
 
 /// A task together with its settings: everything that a setup, a run, a restart or a report asks about it. One class
@@ -141,6 +141,8 @@ class Task {
 
   /// Number of planned evaluations, once its sections are read, on which the failed-run limit is based.
   virtual int plannedEvaluations() const = 0;
+  /// Number of slots that it can use.
+  virtual int mostAtOnce() const { return plannedEvaluations(); }
   /// Whether a final model run repeats the best parameter set.
   virtual bool hasFinalRun() const { return false; }
   /// Whether the results depend on the random seed.

@@ -226,6 +226,8 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatAreSeldomMeant)
        "setup.kdx:91:16: Name: no output measure has this Function_Name, the objective function is always 0"},
       {"Use_Surrogate_Model = 1 => 2", "setup.kdx:123:27: Use_Surrogate_Model: neither 0 nor 1, no search will be run"},
       {"Max_No_Evaluations = 500 => 3", "NoSimultaneousSim: only 3 can be used by the evaluations of this run"},
+      {"Algorithm_Type = 1 => 'PDDS'",
+       "NoSimultaneousSim: only 2 can be used by the evaluations of this run"},
       {"Option = 2 => 4", "setup.kdx:3:14: Option: no task has this number, nothing will be run"},
       {"[/MIREVO_PARAMETERS] => [/MIREVO_PARAMETERS][MIREVO_PARAMETERS][/MIREVO_PARAMETERS]",
        "a second [MIREVO_PARAMETERS] is not read"},

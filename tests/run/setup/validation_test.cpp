@@ -189,9 +189,12 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
        "Population size and/or initial No. of generations too small for surrogate modelling optimisation",
        "Neighbourhood_Size = 61 evaluated sets before the surrogate is fitted, found 60"},
       {"Algorithm_Type = 1 => 2", "Use Population Simplex Evolution algorithm for application with multiple processors",
-       "expected 1 with this Algorithm_Type, found 4"},
+       "expected 1 with this Algorithm_Type, found 4; several model runs at a time: Algorithm_Type = 'PSE' or 'PDDS', "
+       "or a job of several processes (MPI), in which SCE runs one proposal of each complex at once"},
       {"Algorithm_Type = 1 => 0", "Use Population Simplex Evolution algorithm for application with multiple processors",
-       "found 4; a job of several processes (MPI) runs at once: one proposal of each complex"},
+       "found 4; several model runs at a time: Algorithm_Type = 'PSE' or 'PDDS', or a job of several processes (MPI)"},
+      {"Algorithm_Type = 1 => 'PDDS' & Max_No_Evaluations = 500 => 0",
+       "Maximum No. of model evaluations in PDDS algorithm invalid", ""},
       // Scale and location that nothing can give
       {"Option = 2 => 3 & Aggregation_Method = 0 => 1",
        "Standard deviation and location not defined for objective function Flow",
@@ -275,7 +278,8 @@ using RowInSetup = std::tuple<const SectionRow*, const KeywordRow*, std::string>
 std::vector<RowInSetup> rowsInSetups(const std::string& setup) {
   static const std::pair<std::string_view, const char*> kOptions[] = {
       {"SCENARIOS", "0"}, {"SENSITIVITY_ANALYSIS", "1"}, {"UNCERTAINTY_ESTIMATION", "3"}};
-  static const std::pair<std::string_view, const char*> kAlgorithms[] = {{"SCE_", "0"}, {"DDS_", "2"}};
+  static const std::pair<std::string_view, const char*> kAlgorithms[] = {
+      {"SCE_", "0"}, {"DDS_", "2"}, {"PDDS_", "'PDDS'"}};
   std::vector<RowInSetup> found;
   for (const SectionRow* section : setupSchema().sections()) {
     std::string text = setup;

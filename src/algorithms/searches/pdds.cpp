@@ -1,0 +1,56 @@
+#include "algorithms/searches/pdds.h"
+
+namespace mirevo {
+
+namespace {
+
+/// Enough for eight slots to be busy whatever the run times; the loss of sixteen candidates made from the same set is
+/// small.
+constexpr int kUsualCandidates = 16;
+
+}  // namespace
+
+PddsMethod::PddsMethod() {
+  settings.candidates = kUsualCandidates;
+  settings.waitsForAll = false;
+}
+
+const SearchFacts& PddsMethod::facts() const {
+  static constexpr SearchFacts kFacts{
+      .name = {std::nullopt, "PDDS"}, .longName = "Parallel Dynamically Dimensioned Search", .runsInParallel = true};
+  return kFacts;
+}
+
+BoundSection PddsMethod::section() {
+  static const SettingSection<PddsMethod> section{
+      {"OPTIMISATION_ALGORITHM/PDDS_CONTROL_PARAMETERS",
+       "when `Algorithm_Type` is `'PDDS'`",
+       "Parallel Dynamically Dimensioned Search.",
+       {setting<PddsMethod>([](auto& m) -> auto& { return m.settings.perturbation; },
+                            {.name = kPerturbationKeyword,
+                             .defaultValue = "0.2",
+                             .range = kFraction,
+                             .refusal = "Error: Perturbation parameter in PDDS algorithm invalid",
+                             .meaning = std::string(kPerturbationMeaning)}),
+        setting<PddsMethod>([](auto& m) -> auto& { return m.settings.candidates; },
+                            {.name = "Candidates",
+                             .defaultValue = "16",
+                             .range = from(1),
+                             .refusal = "Error: No. of candidates in PDDS algorithm invalid",
+                             .meaning = "Candidates at a time, k: as many evaluations as slots or ranks can work on. "
+                                        "Twice the number of slots keeps them busy. Another k is another search; how "
+                                        "many slots there are makes no difference to it."}),
+        setting<PddsMethod>([](auto& m) -> auto& { return m.settings.waitsForAll; },
+                            {.name = "Wait_For_All",
+                             .defaultValue = "0",
+                             .meaning = "0: as soon as the first of the k candidates under way has its result, the "
+                                        "next one is made. 1: k candidates are made in one step from the same best "
+                                        "set, and all must have their results before the next step."})}}};
+  return {section, *this};
+}
+
+std::string_view PddsMethod::budgetRefusal() const {
+  return "Error: Maximum No. of model evaluations in PDDS algorithm invalid";
+}
+
+}  // namespace mirevo
