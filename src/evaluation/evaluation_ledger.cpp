@@ -7,6 +7,7 @@
 
 #include <fmt/core.h>
 
+#include "common/clock.h"
 #include "common/progress_messages.h"
 
 namespace mirevo {
@@ -85,6 +86,11 @@ std::vector<double> EvaluationLedger::repeatedMeasures(std::size_t place) const 
 
 void EvaluationLedger::markInitiated(std::size_t place) {
   observer_.message(progress::initiatedMessage(numberOf(place)));
+  if (slotUse_ != nullptr && !isFinalRun_) slotUse_->runStarted(runTimeClock());
+}
+
+void EvaluationLedger::markEnded() {
+  if (slotUse_ != nullptr && !isFinalRun_) slotUse_->runEnded(runTimeClock());
 }
 
 void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::string_view leftBehind) {
@@ -141,7 +147,7 @@ void EvaluationLedger::finishRepeated(std::size_t place, EvaluationResult known,
 void EvaluationLedger::finishAgain(std::size_t place, const EvaluationResult& result) {
   const std::string again = progress::nameOfEvaluation(result.number) + " was made again for its output files: ";
   if (!result.ok()) return observer_.warning(again + "the model run failed: " + result.failure->reason);
-  if (result.measureValues != results_[place].measureValues) {
+  if (result.measureValues != results_[indexOf(place)].measureValues) {
     return observer_.warning(again + "the model run has other results than before, and its files are not kept");
   }
   observer_.recordUnkeptFiles(result.number, result.unkeptFiles);
@@ -168,6 +174,7 @@ void EvaluationLedger::warnOfUnusedObservations(const EvaluationResult& result) 
 
 std::vector<EvaluationResult> EvaluationLedger::end() {
   if (const auto text = equalMeasures_.findIn(sets_, results_, isFinalRun_)) observer_.urgentWarning(*text);
+  if (slotUse_ != nullptr && !isFinalRun_) slotUse_->endBatch();
   return close();
 }
 
@@ -176,6 +183,7 @@ EvaluationResult EvaluationLedger::takeFirst() {
   // One at a time, so that what it finds does not depend on what else has ended.
   const auto text = equalMeasures_.findIn({&sets_[first], 1}, {&results_[first], 1}, isFinalRun_);
   if (text) observer_.urgentWarning(*text);
+  if (slotUse_ != nullptr) slotUse_->endPart();
   EvaluationResult result = std::move(results_[first]);
   sets_[first] = {};
   ++closedCount_;
