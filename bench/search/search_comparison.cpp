@@ -1,6 +1,6 @@
 /// Prints the tables of docs/algorithms/search-comparison.md. Usage: search_comparison [table], where the table is
-/// "success", "budget", "complexes", "candidates" or "surrogate"; without an argument all of them. Trials have the
-/// seeds 1, 2, 3,
+/// "success", "budget", "complexes", "candidates", "window" or "surrogate"; without an argument all of them. Trials
+/// have the seeds 1, 2, 3,
 /// ..., so that the figures are the same every time.
 
 #include <algorithm>
@@ -318,6 +318,23 @@ void printCandidates() {
   }
 }
 
+/// More candidates under way than slots: what it costs that slow model runs leave no slot idle.
+void printWindows() {
+  constexpr int kBudget = 8000;
+  fmt::print("\nMedian best value over {} trials, {} evaluations, centred optimum, k candidates under way\n\n", kTrials,
+             kBudget);
+  fmt::print("| function | DDS (k = 1) | k = 8 | k = 16 | k = 24 | k = 32 |\n|---|---|---|---|---|---|\n");
+  for (const std::string name : {"Ackley 10-D", "Griewank 10-D", "Rastrigin 10-D", "Rosenbrock 10-D"}) {
+    const TestFunction function = functionNamed(name);
+    fmt::print("| {} |", name);
+    for (const int k : {1, 8, 16, 24, 32}) {
+      const Setting setting{.method = Method::dds, .budget = kBudget, .dds = {.candidates = k, .waitsForAll = false}};
+      fmt::print(" {:.3g} |", medianOf(runTrials(function, setting, false, kTrials)));
+    }
+    fmt::print("\n");
+  }
+}
+
 void printSurrogate() {
   fmt::print("\nSuccesses of {} / mean evaluations of the successful, shifted optimum, 4 complexes\n\n",
              kSurrogateTrials);
@@ -348,6 +365,7 @@ int main(int argc, char** argv) {
   if (table.empty() || table == "budget") mirevo::printBudget();
   if (table.empty() || table == "complexes") mirevo::printSmallComplexes();
   if (table.empty() || table == "candidates") mirevo::printCandidates();
+  if (table.empty() || table == "window") mirevo::printWindows();
   if (table.empty() || table == "surrogate") mirevo::printSurrogate();
   return 0;
 }

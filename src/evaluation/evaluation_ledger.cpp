@@ -7,6 +7,7 @@
 
 #include <fmt/core.h>
 
+#include "common/clock.h"
 #include "common/progress_messages.h"
 
 namespace mirevo {
@@ -126,6 +127,11 @@ std::vector<double> EvaluationLedger::repeatedMeasures(std::size_t place) const 
 
 void EvaluationLedger::markInitiated(std::size_t place) {
   observer_.message(progress::initiatedMessage(numberOf(place)));
+  if (slotUse_ != nullptr && !isFinalRun_) slotUse_->runStarted(runTimeClock());
+}
+
+void EvaluationLedger::markEnded() {
+  if (slotUse_ != nullptr && !isFinalRun_) slotUse_->runEnded(runTimeClock());
 }
 
 void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::string_view leftBehind) {
@@ -210,6 +216,7 @@ void EvaluationLedger::warnOfUnusedObservations(const EvaluationResult& result) 
 std::vector<EvaluationResult> EvaluationLedger::end() {
   if (const auto text = equalMeasures_.findIn(sets_, results_, isFinalRun_, repeatsAmong(sets_.size())))
     observer_.urgentWarning(*text);
+  if (slotUse_ != nullptr && !isFinalRun_) slotUse_->endBatch();
   return close();
 }
 
@@ -228,6 +235,7 @@ EvaluationResult EvaluationLedger::takeFirst() {
   const auto text = equalMeasures_.findIn({&sets_[first], 1}, {&results_[first], 1}, isFinalRun_, repeatsAmong(1));
   repeats_.erase(closedCount_);
   if (text) observer_.urgentWarning(*text);
+  if (slotUse_ != nullptr) slotUse_->endPart();
   EvaluationResult result = std::move(results_[first]);
   sets_[first] = {};
   ++closedCount_;

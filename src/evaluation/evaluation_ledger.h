@@ -18,6 +18,7 @@
 #include "evaluation/failed_run_policy.h"
 #include "evaluation/known_results.h"
 #include "evaluation/run_comparison.h"
+#include "evaluation/slot_use.h"
 #include "measures/objective_functions.h"
 
 namespace mirevo {
@@ -26,15 +27,17 @@ namespace mirevo {
 /// reported and recorded about it, what counts as failed, and the results in the order of the sets.
 class EvaluationLedger final {
  public:
-  /// `earlier`: evaluations that are not repeated; may be null.
+  /// `earlier`: evaluations that are not repeated; may be null. `slotUse` is told of the model runs; may be null.
   EvaluationLedger(EvaluationObserver& observer, FailedRunPolicy& failedRuns, EarlierEvaluations* earlier = nullptr,
-                   EqualMeasures equalMeasures = {}, RunComparison runComparison = {}, KnownResults known = {})
+                   EqualMeasures equalMeasures = {}, RunComparison runComparison = {}, KnownResults known = {},
+                   SlotUse* slotUse = nullptr)
       : observer_(observer),
         failedRuns_(failedRuns),
         earlier_(earlier),
         equalMeasures_(std::move(equalMeasures)),
         runComparison_(std::move(runComparison)),
-        known_(std::move(known)) {}
+        known_(std::move(known)),
+        slotUse_(slotUse) {}
 
   /// Opens the next sets of the run; `place` below is the 0-based index of a set in the run. Sets that an earlier run
   /// has evaluated get their results at once, unless `mode` requires their model runs; the model is run for the output
@@ -55,6 +58,8 @@ class EvaluationLedger final {
   RunStandard standard() const { return runComparison_.standard(); }
   /// To be called when the model run of the set has started.
   void markInitiated(std::size_t place);
+  /// To be called when it has ended, once for each of those.
+  void markEnded();
   /// Whether the result of a set can be taken; if not, the first successful run must end first, whose set has been
   /// taken before. Makes it a failed one if it is cut off. To be called before finish().
   bool judge(std::size_t place, EvaluationResult& result) const {
@@ -107,6 +112,7 @@ class EvaluationLedger final {
   EqualMeasures equalMeasures_;
   RunComparison runComparison_;
   KnownResults known_;
+  SlotUse* slotUse_;
   bool isFinalRun_ = false;
   std::vector<ParameterSet> sets_;  ///< the ledger's own: an unfinished batch outlives its caller
   std::vector<EvaluationResult> results_;

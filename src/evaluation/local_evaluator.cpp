@@ -11,11 +11,11 @@
 namespace mirevo {
 
 LocalEvaluator::LocalEvaluator(ModelRunner& runner, EvaluationObserver& observer, FailedRunPolicy& failedRuns,
-                               int slotCount, EarlierEvaluations* earlier)
+                               int slotCount, EarlierEvaluations* earlier, SlotUse* slotUse)
     : runner_(runner),
       observer_(observer),
       ledger_(observer, failedRuns, earlier, runner.equalMeasures(), runner.output().runComparison(),
-              runner.knownResults()),
+              runner.knownResults(), slotUse),
       slots_(static_cast<std::size_t>(slotCount)) {
   assert(slotCount > 0);
 }
@@ -96,6 +96,7 @@ bool LocalEvaluator::takeFinished() {
       std::int32_t status = 0;
       runner_.launcher().isExecuting(slot, executing, status);
       if (executing != 0) continue;
+      ledger_.markEnded();
       running->ended = runner_.collect(slot, [this] { stopIfCancelled(); });
       runner_.keepOutputFiles(slot, ledger_.numberOf(place), *running->ended, ledger_.repeatedMeasures(place));
     }

@@ -18,9 +18,9 @@ inline constexpr double kPollSeconds = 0.5;
 /// Runs the model in local slots, several at once.
 class LocalEvaluator final : public Evaluator {
  public:
-  /// `earlier`: evaluations that are not repeated; may be null. All must outlive the object.
+  /// `earlier`: evaluations that are not repeated; may be null, as `slotUse`. All must outlive the object.
   LocalEvaluator(ModelRunner& runner, EvaluationObserver& observer, FailedRunPolicy& failedRuns, int slotCount,
-                 EarlierEvaluations* earlier = nullptr);
+                 EarlierEvaluations* earlier = nullptr, SlotUse* slotUse = nullptr);
 
   std::vector<EvaluationResult> evaluateParameterSets(std::span<const ParameterSet> sets, DispatchMode mode) override;
   void submit(std::span<const ParameterSet> sets) override;

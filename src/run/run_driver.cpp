@@ -260,10 +260,11 @@ void RunDriver::openResults() {
   if (scenarioSeries_) reporter_->recordScenarios(*scenarioSeries_);
   failedRunPolicy_.emplace(config_.plannedEvaluations(), config_.failedRunFolders);
   if (state_.job->hasWorkers()) {
-    evaluator_ = std::make_unique<RankEvaluator>(*runner_, *state_.job, *reporter_, *failedRunPolicy_, earlier);
+    evaluator_ =
+        std::make_unique<RankEvaluator>(*runner_, *state_.job, *reporter_, *failedRunPolicy_, earlier, &slotUse_);
   } else {
     evaluator_ = std::make_unique<LocalEvaluator>(*runner_, *reporter_, *failedRunPolicy_,
-                                                  config_.simultaneousSimulations, earlier);
+                                                  config_.simultaneousSimulations, earlier, &slotUse_);
   }
 }
 
@@ -307,6 +308,11 @@ TaskContext RunDriver::taskContext() {
 TaskOutcome RunDriver::runTask() {
   if (!config_.task) return {std::string(kEndOfTask)};
   outcome_ = config_.task->run(taskContext());
+  const bool hasWorkers = state_.job->hasWorkers();
+  const int slots = hasWorkers ? state_.job->processCount() - 1 : config_.simultaneousSimulations;
+  if (const std::string use = slotUse_.text(slots, hasWorkers ? "workers" : "slots"); !use.empty()) {
+    state_.log.line(use);
+  }
   writeFiles(outcome_->files);
   return *outcome_;
 }

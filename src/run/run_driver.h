@@ -12,6 +12,7 @@
 #include "evaluation/evaluator.h"
 #include "evaluation/failed_run_policy.h"
 #include "evaluation/model_run.h"
+#include "evaluation/slot_use.h"
 #include "measures/objective_functions.h"
 #include "parameters/parameter_model.h"
 #include "platform/processes/process_launcher.h"
@@ -109,6 +110,7 @@ class RunDriver final {
   std::optional<FailedRunPolicy> failedRunPolicy_;
   std::unique_ptr<ProcessLauncher> launcher_;
   std::unique_ptr<ModelRunner> runner_;
+  SlotUse slotUse_;
   std::unique_ptr<Evaluator> evaluator_;
   std::optional<TaskOutcome> outcome_;  ///< of the task, once it has come to its end
   bool hasLoggedDifferences_ = false;

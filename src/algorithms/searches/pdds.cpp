@@ -4,8 +4,7 @@ namespace mirevo {
 
 namespace {
 
-/// Enough for eight slots to be busy whatever the run times; the loss of sixteen candidates made from the same set is
-/// small.
+/// Twice the slots of a usual machine, and few enough for a budget of some hundred evaluations.
 constexpr int kUsualCandidates = 16;
 
 }  // namespace
@@ -38,8 +37,9 @@ BoundSection PddsMethod::section() {
                              .range = from(1),
                              .refusal = "Error: No. of candidates in PDDS algorithm invalid",
                              .meaning = "Candidates at a time, k: as many evaluations as slots or ranks can work on. "
-                                        "Twice the number of slots keeps them busy. Another k is another search; how "
-                                        "many slots there are makes no difference to it."}),
+                                        "Twice the number of slots keeps them busy, four times if run times differ "
+                                        "much. Another k is another search; the number of slots makes no difference "
+                                        "to it."}),
         setting<PddsMethod>([](auto& m) -> auto& { return m.settings.waitsForAll; },
                             {.name = "Wait_For_All",
                              .defaultValue = "0",

@@ -21,12 +21,12 @@ void sendToWorkers(Job& job, RankMessage tag, const std::string& content) {
 }  // namespace
 
 RankEvaluator::RankEvaluator(ModelRunner& runner, Job& job, EvaluationObserver& observer, FailedRunPolicy& failedRuns,
-                             EarlierEvaluations* earlier)
+                             EarlierEvaluations* earlier, SlotUse* slotUse)
     : runner_(runner),
       job_(job),
       observer_(observer),
       ledger_(observer, failedRuns, earlier, runner.equalMeasures(), runner.output().runComparison(),
-              runner.knownResults()),
+              runner.knownResults(), slotUse),
       workers_(static_cast<std::size_t>(job.processCount() - 1)) {}
 
 std::vector<EvaluationResult> RankEvaluator::evaluateParameterSets(std::span<const ParameterSet> sets,
@@ -105,6 +105,7 @@ void RankEvaluator::handle(const Message& message) {
 
 void RankEvaluator::takeResult(int rank, ResultMessage message) {
   requireSet(rank);
+  ledger_.markEnded();
   for (const std::string& text : std::exchange(message.warnings, {})) observer_.warning(text);
   worker(rank).answer = std::move(message);
 }
@@ -142,6 +143,7 @@ void RankEvaluator::requireSet(int rank) {
 
 void RankEvaluator::giveUp(int rank, const GivenUpMessage& message) {
   requireSet(rank);
+  ledger_.markEnded();
   ledger_.putBack(*std::exchange(worker(rank).set, std::nullopt));
   worker(rank).isGivenUp = true;
   for (const std::string& text : message.warnings) observer_.warning(text);

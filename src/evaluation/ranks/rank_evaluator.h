@@ -20,9 +20,9 @@ namespace mirevo {
 class RankEvaluator final : public Evaluator {
  public:
   /// `runner` has no slots here; it tells which sets cannot be run. beginWorkers() must have been called. `earlier`:
-  /// evaluations that are not repeated; may be null. All must outlive the object.
+  /// evaluations that are not repeated; may be null, as `slotUse`. All must outlive the object.
   RankEvaluator(ModelRunner& runner, Job& job, EvaluationObserver& observer, FailedRunPolicy& failedRuns,
-                EarlierEvaluations* earlier = nullptr);
+                EarlierEvaluations* earlier = nullptr, SlotUse* slotUse = nullptr);
 
   /// Also throws FatalError, with the worker's own message, after a fatal error on a worker.
   std::vector<EvaluationResult> evaluateParameterSets(std::span<const ParameterSet> sets, DispatchMode mode) override;
