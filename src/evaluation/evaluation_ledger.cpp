@@ -1,5 +1,8 @@
 #include "evaluation/evaluation_ledger.h"
 
+#include <algorithm>
+#include <cstddef>
+#include <iterator>
 #include <utility>
 
 #include <fmt/core.h>
@@ -20,15 +23,16 @@ std::string completedText(const EvaluationResult& result) {
 
 }  // namespace
 
-void EvaluationLedger::begin(std::span<const ParameterSet> sets, DispatchMode mode) {
-  sets_.assign(sets.begin(), sets.end());
-  results_.assign(sets.size(), {});
-  isFinished_.assign(sets.size(), false);
+void EvaluationLedger::open(std::span<const ParameterSet> sets, DispatchMode mode) {
+  const std::size_t first = endPlace();
+  sets_.insert(sets_.end(), sets.begin(), sets.end());
+  results_.resize(sets_.size());
+  isFinished_.resize(sets_.size(), false);
   isFinalRun_ = mode == DispatchMode::finalRun;
   if (earlier_ == nullptr || isFinalRun_) return;
-  for (std::size_t place = 0; place < sets.size(); ++place) {
+  for (std::size_t place = first; place < endPlace(); ++place) {
     if (earlier_->repeatsRun(numberOf(place))) continue;
-    auto result = earlier_->take(numberOf(place), sets[place]);
+    auto result = earlier_->take(numberOf(place), set(place));
     if (!result) continue;
     replay(place, std::move(*result));
     if (!earlier_->isRunAgain(numberOf(place))) continue;
@@ -39,7 +43,7 @@ void EvaluationLedger::begin(std::span<const ParameterSet> sets, DispatchMode mo
 
 void EvaluationLedger::replay(std::size_t place, EvaluationResult result) {
   ComparisonFindings found = runComparison_.take(result, isFinalRun_);
-  observer_.evaluationReplayed(sets_[place], result);
+  observer_.evaluationReplayed(set(place), result);
   tell(std::move(found));
   store(place, std::move(result));
 }
@@ -49,19 +53,19 @@ void EvaluationLedger::store(std::size_t place, EvaluationResult result) {
   // Not needed any more; the batch keeps its results until it is complete.
   result.shownSeries = {};
   if (observer_.readsSimulatedValues()) result.simulatedValues = std::vector<double>();  // {} would keep its memory
-  const EvaluationResult& stored = results_[place] = std::move(result);
-  isFinished_[place] = true;
+  const EvaluationResult& stored = results_[indexOf(place)] = std::move(result);
+  isFinished_[indexOf(place)] = true;
   ++finishedCount_;
   if (!stored.ok()) failedRuns_.countFailure(stored.number, *stored.failure);
 }
 
 std::optional<std::size_t> EvaluationLedger::takeNext() {
-  while (next_ < sets_.size() && isFinished_[next_]) ++next_;
-  if (next_ == sets_.size() && returned_.empty()) return std::nullopt;
-  if (openCount_ > 0 && runComparison_.isAwaited()) return std::nullopt;
-  ++openCount_;
+  while (next_ < endPlace() && isFinished_[indexOf(next_)]) ++next_;
+  if (next_ == endPlace() && returned_.empty()) return std::nullopt;
+  if (runningCount_ > 0 && runComparison_.isAwaited()) return std::nullopt;
+  ++runningCount_;
   // In their order: a result may wait for that of a set before it.
-  if (returned_.empty() || (next_ < sets_.size() && next_ < *returned_.begin())) return next_++;
+  if (returned_.empty() || (next_ < endPlace() && next_ < *returned_.begin())) return next_++;
   const std::size_t first = *returned_.begin();
   returned_.erase(returned_.begin());
   return first;
@@ -69,11 +73,11 @@ std::optional<std::size_t> EvaluationLedger::takeNext() {
 
 void EvaluationLedger::putBack(std::size_t place) {
   returned_.insert(place);
-  --openCount_;
+  --runningCount_;
 }
 
 std::vector<double> EvaluationLedger::repeatedMeasures(std::size_t place) const {
-  if (runAgain_.contains(place)) return results_[place].measureValues;
+  if (runAgain_.contains(place)) return results_[indexOf(place)].measureValues;
   if (earlier_ == nullptr) return {};
   const auto* measures = earlier_->measuresOf(numberOf(place));
   return measures == nullptr ? std::vector<double>() : *measures;
@@ -85,21 +89,21 @@ void EvaluationLedger::markInitiated(std::size_t place) {
 
 void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::string_view leftBehind) {
   result.number = numberOf(place);
-  --openCount_;
+  --runningCount_;
   tellOfRun(result, leftBehind);
   if (runAgain_.erase(place) > 0) {
     observer_.message(completedText(result));
     return finishAgain(place, result);
   }
   noteUnkeptFiles(place, result);
-  if (auto known = earlier_ == nullptr ? std::nullopt : earlier_->take(result.number, sets_[place])) {
+  if (auto known = earlier_ == nullptr ? std::nullopt : earlier_->take(result.number, set(place))) {
     observer_.message(completedText(result));
     return finishRepeated(place, std::move(*known), std::move(result));
   }
   ComparisonFindings found = runComparison_.take(result, isFinalRun_);
-  observer_.recordEvaluation(sets_[place], result);
+  observer_.recordEvaluation(set(place), result);
   observer_.message(completedText(result));
-  observer_.evaluationFinished(sets_[place], result);
+  observer_.evaluationFinished(set(place), result);
   tell(std::move(found));
   store(place, std::move(result));
 }
@@ -167,24 +171,43 @@ std::vector<EvaluationResult> EvaluationLedger::end() {
   return close();
 }
 
+EvaluationResult EvaluationLedger::takeFirst() {
+  const std::size_t first = indexOf(closedCount_);
+  // One at a time, so that what it finds does not depend on what else has ended.
+  const auto text = equalMeasures_.findIn({&sets_[first], 1}, {&results_[first], 1}, isFinalRun_);
+  if (text) observer_.urgentWarning(*text);
+  EvaluationResult result = std::move(results_[first]);
+  sets_[first] = {};
+  ++closedCount_;
+  --finishedCount_;
+  next_ = std::max(next_, closedCount_);
+  // The sets closed are dropped together, so that each of many costs the same.
+  if (const auto count = static_cast<std::ptrdiff_t>(first + 1); 2 * count > std::ssize(sets_)) {
+    sets_.erase(sets_.begin(), sets_.begin() + count);
+    results_.erase(results_.begin(), results_.begin() + count);
+    isFinished_.erase(isFinished_.begin(), isFinished_.begin() + count);
+    start_ = closedCount_;
+  }
+  return result;
+}
+
 std::vector<EvaluationResult> EvaluationLedger::close() {
-  evaluationCount_ += static_cast<int>(sets_.size());
+  start_ = closedCount_ = next_ = endPlace();
   sets_ = {};
   isFinished_.clear();
-  next_ = 0;
   returned_.clear();
   runAgain_.clear();
   finishedCount_ = 0;
-  openCount_ = 0;
+  runningCount_ = 0;
   return std::exchange(results_, {});
 }
 
 UnfinishedBatch EvaluationLedger::takeUnfinished() {
   UnfinishedBatch unfinished;
-  for (std::size_t place = 0; place < sets_.size(); ++place) {
-    if (!isFinished_[place]) continue;
-    unfinished.sets.push_back(std::move(sets_[place]));
-    unfinished.results.push_back(std::move(results_[place]));
+  for (std::size_t place = closedCount_; place < endPlace(); ++place) {
+    if (!isFinished_[indexOf(place)]) continue;
+    unfinished.sets.push_back(std::move(sets_[indexOf(place)]));
+    unfinished.results.push_back(std::move(results_[indexOf(place)]));
   }
   close();
   return unfinished;

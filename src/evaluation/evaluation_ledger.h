@@ -34,19 +34,20 @@ class EvaluationLedger final {
         equalMeasures_(std::move(equalMeasures)),
         runComparison_(std::move(runComparison)) {}
 
-  /// Opens the next batch of the run, when none is open; `place` below is the 0-based index of a set in it.
-  /// Sets that an earlier run has evaluated get their results at once, unless `mode` requires their model runs; the
-  /// model is run for the output files of those that are EarlierEvaluations::isRunAgain(). Throws
-  /// FatalError when the failed-run limit is exceeded, and if an earlier evaluation was of another set.
-  void begin(std::span<const ParameterSet> sets, DispatchMode mode);
+  /// Opens the next sets of the run; `place` below is the 0-based index of a set in the run. Sets that an earlier run
+  /// has evaluated get their results at once, unless `mode` requires their model runs; the model is run for the output
+  /// files of those that are EarlierEvaluations::isRunAgain(). Throws FatalError when the failed-run limit is exceeded,
+  /// and if an earlier evaluation was of another set. A batch, which end() closes, is opened when nothing is open; sets
+  /// that takeFirst() takes may be opened beside others.
+  void open(std::span<const ParameterSet> sets, DispatchMode mode);
   /// The next set, in order, that has no result yet; empty when all are taken, and as long as a model run may become
   /// the first successful one, by which the next ones are judged.
   std::optional<std::size_t> takeNext();
   /// Takes a set back that could not be run where it was to be; it is the next one again.
   void putBack(std::size_t place);
-  const ParameterSet& set(std::size_t place) const { return sets_[place]; }
+  const ParameterSet& set(std::size_t place) const { return sets_[indexOf(place)]; }
   /// The set's number in the run, from 1.
-  int numberOf(std::size_t place) const { return evaluationCount_ + static_cast<int>(place) + 1; }
+  static int numberOf(std::size_t place) { return static_cast<int>(place) + 1; }
   /// By what the model run of the set taken last is judged.
   RunStandard standard() const { return runComparison_.standard(); }
   /// To be called when the model run of the set has started.
@@ -66,11 +67,16 @@ class EvaluationLedger final {
   /// The output measures of the row that the evaluation of this set has already, if its model is run again beside it;
   /// otherwise empty.
   std::vector<double> repeatedMeasures(std::size_t place) const;
-  bool isComplete() const { return finishedCount_ == sets_.size() && runAgain_.empty(); }
+  bool isOpen() const { return closedCount_ < endPlace(); }
+  bool isComplete() const { return finishedCount_ == endPlace() - closedCount_ && runAgain_.empty(); }
   /// Closes a complete batch and returns one result per set, in order. Warns if no model run so far depends on the
   /// parameters.
   std::vector<EvaluationResult> end();
-  /// Evaluator::takeUnfinished(); no batch is open afterwards.
+  /// Whether the first of the open sets has its result and no model run is made for it.
+  bool isFirstComplete() const { return isFinished_[indexOf(closedCount_)] && !runAgain_.contains(closedCount_); }
+  /// Then closes this set alone and returns its result. Warns as end() does.
+  EvaluationResult takeFirst();
+  /// Evaluator::takeUnfinished(); nothing is open afterwards.
   UnfinishedBatch takeUnfinished();
 
  private:
@@ -84,6 +90,8 @@ class EvaluationLedger final {
   void finishRepeated(std::size_t place, EvaluationResult known, EvaluationResult result);
   void finishAgain(std::size_t place, const EvaluationResult& result);
   std::vector<EvaluationResult> close();
+  std::size_t indexOf(std::size_t place) const { return place - start_; }
+  std::size_t endPlace() const { return start_ + sets_.size(); }
 
   EvaluationObserver& observer_;
   FailedRunPolicy& failedRuns_;
@@ -94,12 +102,13 @@ class EvaluationLedger final {
   std::vector<ParameterSet> sets_;  ///< the ledger's own: an unfinished batch outlives its caller
   std::vector<EvaluationResult> results_;
   std::vector<bool> isFinished_;    ///< whether a set has its result
+  std::size_t start_ = 0;           ///< place of the first of these; some of them may be closed already
+  std::size_t closedCount_ = 0;     ///< sets of the run that are closed: the place of the first open one
   std::size_t next_ = 0;            ///< first set that was not taken
   std::set<std::size_t> returned_;  ///< sets that were taken and put back, and those of runAgain_
   std::set<std::size_t> runAgain_;  ///< sets that have a result, whose model is run for its output files alone
-  std::size_t finishedCount_ = 0;   ///< sets that have a result
-  std::size_t openCount_ = 0;       ///< sets that were taken and have no result
-  int evaluationCount_ = 0;         ///< sets of the batches before this one
+  std::size_t finishedCount_ = 0;   ///< open sets that have a result
+  std::size_t runningCount_ = 0;    ///< sets that were taken and have no result
   std::set<std::pair<int, std::size_t>> warnedOf_;  ///< evaluations and measures with unused observations
   std::map<std::size_t, std::size_t> fewestUsed_;   ///< by measure, the fewest observations used of which a warning was
                                                     ///< given

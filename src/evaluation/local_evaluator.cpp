@@ -21,14 +21,33 @@ LocalEvaluator::LocalEvaluator(ModelRunner& runner, EvaluationObserver& observer
 
 std::vector<EvaluationResult> LocalEvaluator::evaluateParameterSets(std::span<const ParameterSet> sets,
                                                                     DispatchMode mode) {
-  ledger_.begin(sets, mode);
+  assert(!ledger_.isOpen());
+  ledger_.open(sets, mode);
   startInFreeSlots();
-  while (!ledger_.isComplete()) {
-    if (!takeFinished()) runner_.launcher().waitForChange(kPollSeconds);
-    stopIfCancelled();
-    startInFreeSlots();
-  }
+  while (!ledger_.isComplete()) goOn();
   return ledger_.end();
+}
+
+void LocalEvaluator::submit(std::span<const ParameterSet> sets) {
+  ledger_.open(sets, DispatchMode::task);
+  startInFreeSlots();
+}
+
+EvaluationResult LocalEvaluator::awaitFirst() {
+  assert(ledger_.isOpen());
+  while (!ledger_.isFirstComplete()) goOn();
+  return ledger_.takeFirst();
+}
+
+UnfinishedBatch LocalEvaluator::takeUnfinished() {
+  for (Slot& slot : slots_) slot.running.reset();
+  return ledger_.takeUnfinished();
+}
+
+void LocalEvaluator::goOn() {
+  if (!takeFinished()) runner_.launcher().waitForChange(kPollSeconds);
+  stopIfCancelled();
+  startInFreeSlots();
 }
 
 void LocalEvaluator::startInFreeSlots() {

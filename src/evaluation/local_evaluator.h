@@ -23,13 +23,15 @@ class LocalEvaluator final : public Evaluator {
                  EarlierEvaluations* earlier = nullptr);
 
   std::vector<EvaluationResult> evaluateParameterSets(std::span<const ParameterSet> sets, DispatchMode mode) override;
-  UnfinishedBatch takeUnfinished() override { return ledger_.takeUnfinished(); }
+  void submit(std::span<const ParameterSet> sets) override;
+  EvaluationResult awaitFirst() override;
+  UnfinishedBatch takeUnfinished() override;
   void settleAggregates(std::span<EvaluationResult> sample) override;
 
  private:
   /// A model run in a slot.
   struct Running {
-    std::size_t place = 0;                  ///< index in the batch of the set
+    std::size_t place = 0;                  ///< of its set in the ledger
     std::optional<EvaluationResult> ended;  ///< waits for the first successful run, see EvaluationLedger::judge()
   };
   struct Slot {
@@ -37,6 +39,8 @@ class LocalEvaluator final : public Evaluator {
     bool isGivenUp = false;  ///< its process folder cannot be used any more
   };
 
+  /// Waits until something may have ended, takes what has, and starts the next sets.
+  void goOn();
   void startInFreeSlots();
   /// Starts the next set on the free slot; sets that cannot be run get their result at once and are skipped.
   void startNext(int slot);

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <algorithm>
 #include <cmath>
 #include <map>
 #include <memory>
@@ -121,6 +122,21 @@ class EvaluationTest : public testing::Test {
     std::vector<ParameterSet> sets;
     for (const double value : values) sets.push_back({value});
     return evaluator.evaluateParameterSets(sets, mode);
+  }
+  /// The same, one after the other with at most `window` of them submitted at a time; 0: as one batch.
+  static std::vector<EvaluationResult> evaluateInWindow(Evaluator& evaluator, const std::vector<double>& values,
+                                                        std::size_t window) {
+    if (window == 0) return evaluate(evaluator, values);
+    std::vector<EvaluationResult> results;
+    std::size_t submitted = 0;
+    while (results.size() < values.size()) {
+      for (; submitted < std::min(values.size(), results.size() + window); ++submitted) {
+        const ParameterSet set{values[submitted]};
+        evaluator.submit({&set, 1});
+      }
+      results.push_back(evaluator.awaitFirst());
+    }
+    return results;
   }
   static std::vector<double> measuresOf(const std::vector<EvaluationResult>& results) {
     std::vector<double> values;

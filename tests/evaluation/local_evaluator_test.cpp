@@ -100,13 +100,56 @@ TEST_F(LocalEvaluatorTest, ResultsStandInTheOrderOfTheSetsWhateverEndsFirst) {
   EXPECT_EQ(second.at(0).number, 7);
 }
 
+TEST_F(LocalEvaluatorTest, ResultsOfAWindowAreTakenInTheOrderOfItsSetsWhateverEndsFirst) {
+  // slots, window, when all have ended, in which order
+  const std::tuple<int, std::size_t, double, std::vector<int>> cases[] = {
+      {1, 1, 14.0, {1, 2, 3, 4, 5, 6}},
+      {1, 3, 14.0, {1, 2, 3, 4, 5, 6}},
+      {2, 2, 10.5, {2, 1, 4, 3, 5, 6}},  // a slot waits for the first set
+      {2, 4, 7.5, {2, 3, 4, 1, 5, 6}},   // it goes on with what is behind that
+  };
+  const std::vector<double> seconds = {6.0, 1.0, 3.0, 1.5, 1.0, 1.5};
+  for (const auto& [slots, window, end, order] : cases) {
+    SCOPED_TRACE(fmt::format("{} slots, window {}", slots, window));
+    observer_.events.clear();
+    FakeLauncher launcher(
+        [&](int start, const std::string&) { return computes(seconds.at(static_cast<std::size_t>(start - 1))); });
+    LocalEvaluator& evaluator = makeEvaluator(launcher, slots, 100);
+    const auto results = evaluateInWindow(evaluator, {0.0, 0.5, 1.0, 1.5, 2.0, 2.5}, window);
+    EXPECT_THAT(measuresOf(results), ElementsAre(-1.0, -0.5, 0.0, 0.5, 1.0, 1.5));
+    for (int i = 0; i < 6; ++i) EXPECT_EQ(results[static_cast<std::size_t>(i)].number, i + 1);
+    EXPECT_DOUBLE_EQ(launcher.now, end);
+    std::vector<int> ended;
+    for (const std::string& event : observer_.events) {
+      if (event.starts_with("record ")) ended.push_back(event.at(7) - '0');
+    }
+    EXPECT_EQ(ended, order);
+    EXPECT_EQ(failedRuns_->failedCount(), 0);
+    launcher.starts = 0;
+    EXPECT_EQ(evaluate(evaluator, {3.0}).at(0).number, 7);
+    EXPECT_EQ(evaluateInWindow(evaluator, {9.5, 3.0}, 2).at(1).number, 9) << "the first of them cannot be run";
+  }
+}
+
+TEST_F(LocalEvaluatorTest, AWindowThatIsCutOffHandsOverWhatHasEndedBehindItsFirstSet) {
+  FakeLauncher launcher([&](int start, const std::string&) { return computes(start == 3 ? 100.0 : 1.0); });
+  launcher.onWait = [&] { observer_.cancelled = launcher.now >= 5.0; };
+  LocalEvaluator& evaluator = makeEvaluator(launcher, 2, 100);
+  EXPECT_THROW(evaluateInWindow(evaluator, {2.0, 3.0, 4.0, 6.0, 7.0, 8.0}, 3), RunCancelled);
+  EXPECT_EQ(launcher.halts, 1);
+  const UnfinishedBatch made = evaluator.takeUnfinished();
+  EXPECT_THAT(made.sets, ElementsAre(ParameterSet{6.0}, ParameterSet{7.0}));
+  EXPECT_THAT(measuresOf(made.results), ElementsAre(5.0, 6.0));
+  EXPECT_TRUE(evaluator.takeUnfinished().sets.empty());
+}
+
 TEST_F(LocalEvaluatorTest, TheFailureAfterTheLimitEndsTheRunOnceItIsOnRecord) {
-  const std::tuple<int, int> cases[] = {{1, 1}, {9, 1}, {10, 2}, {25, 3}};
-  for (const auto& [planned, fatalFailure] : cases) {
+  const std::tuple<int, int, std::size_t> cases[] = {{1, 1, 0}, {9, 1, 0}, {10, 2, 0}, {10, 2, 2}, {25, 3, 0}};
+  for (const auto& [planned, fatalFailure, window] : cases) {
     observer_.events.clear();
     FakeLauncher launcher([&](int, const std::string&) { return fails(1.0); });
     LocalEvaluator& evaluator = makeEvaluator(launcher, 1, planned);
-    EXPECT_EQ(refusalOf([&] { evaluate(evaluator, std::vector(5, 2.0)); }),
+    EXPECT_EQ(refusalOf([&] { evaluateInWindow(evaluator, std::vector(5, 2.0), window); }),
               fmt::format("Error: Unable to continue. No of failed simulations too high.\n"
                           "failed evaluations: {}; at most {} may fail, a tenth of the {} planned\n"
                           "the last of them, No. {}: run.sh exited with code 3\n| reading\n| no convergence",
@@ -134,7 +177,8 @@ TEST_F(LocalEvaluatorTest, ARunWithoutPairsIsAFailedOneAsSoonAsAnotherHasShownTh
       {{{1, 2.0}}, {"1990", "2001", "1990", "2001"}, {2, 4}},
   };
   for (const auto& [earlier, years, failing] : cases) {
-    for (const auto& [slots, keepsPairs] : {std::pair{1, true}, {3, true}, {3, false}}) {
+    for (const auto& [slots, keepsPairs, window] :
+         {std::tuple{1, true, 0U}, {3, true, 0U}, {3, false, 0U}, {3, true, 3U}, {2, false, 4U}}) {
       takeUp(earlier, keepsPairs);
       FakeLauncher launcher([&](int start, const std::string&) {
         const std::string& year = years.at(static_cast<std::size_t>(start) - 1);
@@ -146,7 +190,8 @@ TEST_F(LocalEvaluatorTest, ARunWithoutPairsIsAFailedOneAsSoonAsAnotherHasShownTh
       });
       std::vector<int> failed;
       const std::string refusal = refusalOf([&] {
-        for (const EvaluationResult& result : evaluate(makeEvaluator(launcher, slots, 100), std::vector(5, 2.0))) {
+        for (const EvaluationResult& result :
+             evaluateInWindow(makeEvaluator(launcher, slots, 100), std::vector(5, 2.0), window)) {
           if (!result.ok()) failed.push_back(result.number);
         }
       });
@@ -172,7 +217,7 @@ TEST_F(LocalEvaluatorTest, RunsAreComparedWithTheFirstSuccessWhateverEndsFirst) 
   };
   for (const auto& [coverage, earlier, failing, told] : cases) {
     description_.minimumCoverage = coverage;
-    for (const int slots : {1, 3}) {
+    for (const auto& [slots, window] : {std::pair{1, 0U}, {3, 0U}, {3, 3U}, {2, 4U}}) {
       observer_.pairs.clear();
       takeUp(earlier);
       const auto firstRun = earlier.size();
@@ -187,7 +232,8 @@ TEST_F(LocalEvaluatorTest, RunsAreComparedWithTheFirstSuccessWhateverEndsFirst) 
         return batch;
       });
       std::vector<int> failed;
-      for (const EvaluationResult& result : evaluate(makeEvaluator(launcher, slots, 100), std::vector(5, 2.0))) {
+      for (const EvaluationResult& result :
+           evaluateInWindow(makeEvaluator(launcher, slots, 100), std::vector(5, 2.0), window)) {
         if (!result.ok()) failed.push_back(result.number);
         if (result.number < 4 || result.ok()) continue;
         EXPECT_EQ(result.failure->kind, EvaluationFailure::Kind::tooFewPairs);
@@ -218,8 +264,8 @@ TEST_F(LocalEvaluatorTest, FilesThatLackWhatThoseOfTheFirstSuccessHaveAreToldWha
   };
   description_.failedFolderPrefix = folder_ / "run_Failed";
   for (const auto& [written, failing, told] : cases) {
-    for (const int slots : {1, 3}) {
-      SCOPED_TRACE(told.back() + fmt::format(" {}", slots));
+    for (const auto& [slots, window] : {std::pair{1, 0U}, {3, 0U}, {1, 2U}, {3, 4U}}) {
+      SCOPED_TRACE(told.back() + fmt::format(" {} {}", slots, window));
       observer_.pairs.clear();
       foldersToKeep_ = 1;
       FakeLauncher launcher([&](int start, const std::string&) {
@@ -230,7 +276,8 @@ TEST_F(LocalEvaluatorTest, FilesThatLackWhatThoseOfTheFirstSuccessHaveAreToldWha
         return batch;
       });
       std::vector<int> failed;
-      for (const EvaluationResult& result : evaluate(makeEvaluator(launcher, slots, 100), std::vector(4, 2.0))) {
+      for (const EvaluationResult& result :
+           evaluateInWindow(makeEvaluator(launcher, slots, 100), std::vector(4, 2.0), window)) {
         if (result.ok()) continue;
         failed.push_back(result.number);
         EXPECT_THAT(result.measureValues, ElementsAre(kFailedRunValue));
@@ -348,6 +395,7 @@ TEST_F(LocalEvaluatorTest, CancellationHaltsWhatRunsAndStartsNothing) {
   EXPECT_EQ(launcher.halts, 1);
   EXPECT_EQ(launcher.starts, 2);
   EXPECT_EQ(observer_.events.back(), "Simulation cancelled");
+  evaluator.takeUnfinished();
   EXPECT_THROW(evaluate(evaluator, std::vector(4, 2.0)), RunCancelled);
   EXPECT_EQ(launcher.starts, 2);
 }
@@ -387,15 +435,42 @@ TEST_F(LocalEvaluatorTest, WhatAnEarlierRunHasEvaluatedIsNotRunAgain) {
   EXPECT_EQ(observer_.events.back(), "replay 5 a=6 OK");
 }
 
+/// An interrupted run has rows of sets behind one that had not ended.
+TEST_F(LocalEvaluatorTest, AWindowTakesWhatAnEarlierRunHasEvaluated) {
+  FakeLauncher launcher([&](int, const std::string&) { return computes(1.0); });
+  takeUp({{1, 2.0}, {2, 3.0}, {4, -1.5}, {5, 6.0}});
+  LocalEvaluator& evaluator = makeEvaluator(launcher, 2, 10);
+  const auto results = evaluateInWindow(evaluator, {2.0, 3.0, 4.0, 1.5, 6.0, 7.0, 8.0}, 3);
+  EXPECT_THAT(measuresOf(results), ElementsAre(1.0, 2.0, 3.0, 0.5, 5.0, 6.0, 7.0));
+  EXPECT_EQ(results[3].failure->reason, "in the past");
+  EXPECT_EQ(failedRuns_->failedCount(), 1);
+  EXPECT_EQ(launcher.starts, 3);
+  std::erase_if(observer_.events, [](const std::string& event) { return event.starts_with("Evaluation"); });
+  EXPECT_THAT(observer_.events,
+              ElementsAre("replay 1 a=2 OK", "replay 2 a=3 OK", "replay 4 a=1.5 FAILED", "replay 5 a=6 OK",
+                          "record 3 a=4 OK", "record 6 a=7 OK", "record 7 a=8 OK"));
+}
+
+TEST_F(LocalEvaluatorTest, AModelWhoseMeasuresNeverChangeIsToldOfAfterTwentyResultsOfAWindow) {
+  FakeLauncher launcher([&](int start, const std::string&) { return computes(start % 2 == 0 ? 1.0 : 3.0, 3.0); });
+  std::vector<double> values(25);
+  for (std::size_t i = 0; i < values.size(); ++i) values[i] = 0.1 * static_cast<double>(i);
+  evaluateInWindow(makeEvaluator(launcher, 2, 100), values, 4);
+  const auto isWarning = [](const std::string& event) { return event.starts_with("warning at once: All 20 "); };
+  EXPECT_EQ(std::count_if(observer_.events.begin(), observer_.events.end(), isWarning), 1);
+}
+
 TEST_F(LocalEvaluatorTest, ARunWhoseOutputFilesCouldNotBeKeptIsMadeAgainForThemAlone) {
   folder_.write("file", "");
   // Where files are kept, by how much the model run differs from before, what is told.
-  const std::tuple<const char*, double, std::vector<std::string>> cases[] = {
-      {"run_Saved", 0.0, {"2 lacks 0"}},
-      {"run_Saved", 0.5, {"has other results than before, and its files are not kept"}},
-      {"run_Saved", 1e9, {"the model run failed"}},
-      {"file/run_Saved", 0.0, {" was not kept: ", "2 lacks 1", " was not kept: ", "4 lacks 1"}}};
-  for (const auto& [where, change, told] : cases) {
+  const std::tuple<const char*, double, std::vector<std::string>, std::size_t> cases[] = {
+      {"run_Saved", 0.0, {"2 lacks 0"}, 0},
+      {"run_Saved", 0.0, {"2 lacks 0"}, 3},
+      {"run_Saved", 0.5, {"has other results than before, and its files are not kept"}, 0},
+      {"run_Saved", 1e9, {"the model run failed"}, 0},
+      {"run_Saved", 1e9, {"the model run failed"}, 1},
+      {"file/run_Saved", 0.0, {" was not kept: ", "2 lacks 1", " was not kept: ", "4 lacks 1"}, 0}};
+  for (const auto& [where, change, told, window] : cases) {
     description_.savedFiles = {folder_ / "base/simulated.csv"};
     description_.savedFolder = folder_ / where;
     takeUp({{1, 2.0}, {2, 4.0}, {3, 6.0}});
@@ -405,7 +480,7 @@ TEST_F(LocalEvaluatorTest, ARunWhoseOutputFilesCouldNotBeKeptIsMadeAgainForThemA
     });
     observer_.events.clear();
     if (change != 0.0) folder_.write("run_Saved/2/simulated.csv", "kept before");
-    const auto results = evaluate(makeEvaluator(launcher, 1, 100), {2.0, 4.0, 6.0, 8.0});
+    const auto results = evaluateInWindow(makeEvaluator(launcher, 1, 100), {2.0, 4.0, 6.0, 8.0}, window);
     EXPECT_THAT(measuresOf(results), ElementsAre(1.0, 3.0, 5.0, 7.0)) << where << change;
     std::vector<testing::Matcher<std::string>> matchers;
     for (const std::string& text : told) matchers.push_back(HasSubstr(text));

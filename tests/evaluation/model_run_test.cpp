@@ -176,7 +176,7 @@ TEST_F(ModelRunTest, ARunThatMeetsFewerObservationsThanAnyBeforeIsNamedInAWarnin
   FailedRunPolicy failedRuns(10);
   EvaluationLedger ledger(observer_, failedRuns);
   const std::vector<ParameterSet> sets(std::size(cases), {2.0});
-  ledger.begin(sets, DispatchMode::task);
+  ledger.open(sets, DispatchMode::task);
   std::string last;
   for (const auto& [simulated, warning] : cases) {
     writes("simulated.csv", std::string("time,flow\n") + simulated);

@@ -1,6 +1,7 @@
 #include "evaluation/ranks/rank_evaluator.h"
 
 #include <algorithm>
+#include <cassert>
 #include <utility>
 
 #include <fmt/core.h>
@@ -29,16 +30,30 @@ RankEvaluator::RankEvaluator(ModelRunner& runner, Job& job, EvaluationObserver& 
 
 std::vector<EvaluationResult> RankEvaluator::evaluateParameterSets(std::span<const ParameterSet> sets,
                                                                    DispatchMode mode) {
-  ledger_.begin(sets, mode);
+  assert(!ledger_.isOpen());
+  ledger_.open(sets, mode);
   startOnFreeWorkers();
-  while (!ledger_.isComplete()) {
-    const auto message = job_.receive(kMasterPollSeconds);
-    if (message) handle(*message);
-    finishAnswered();
-    stopIfCancelled();
-    startOnFreeWorkers();
-  }
+  while (!ledger_.isComplete()) goOn();
   return ledger_.end();
+}
+
+void RankEvaluator::submit(std::span<const ParameterSet> sets) {
+  ledger_.open(sets, DispatchMode::task);
+  startOnFreeWorkers();
+}
+
+EvaluationResult RankEvaluator::awaitFirst() {
+  assert(ledger_.isOpen());
+  while (!ledger_.isFirstComplete()) goOn();
+  return ledger_.takeFirst();
+}
+
+void RankEvaluator::goOn() {
+  const auto message = job_.receive(kMasterPollSeconds);
+  if (message) handle(*message);
+  finishAnswered();
+  stopIfCancelled();
+  startOnFreeWorkers();
 }
 
 void RankEvaluator::startOnFreeWorkers() {

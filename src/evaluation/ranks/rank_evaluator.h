@@ -26,17 +26,21 @@ class RankEvaluator final : public Evaluator {
 
   /// Also throws FatalError, with the worker's own message, after a fatal error on a worker.
   std::vector<EvaluationResult> evaluateParameterSets(std::span<const ParameterSet> sets, DispatchMode mode) override;
+  void submit(std::span<const ParameterSet> sets) override;
+  EvaluationResult awaitFirst() override;
   UnfinishedBatch takeUnfinished() override { return ledger_.takeUnfinished(); }
   void settleAggregates(std::span<EvaluationResult> sample) override;
 
  private:
   struct Worker {
     std::optional<ReadyMessage> place;    ///< host and process folder; empty until it is ready
-    std::optional<std::size_t> set;       ///< index in the batch of the set that it runs
+    std::optional<std::size_t> set;       ///< place in the ledger of the set that it runs
     std::optional<ResultMessage> answer;  ///< waits for the first successful run, see EvaluationLedger::judge()
     bool isGivenUp = false;               ///< its process folder cannot be used any more
   };
 
+  /// Waits for a message, takes the results that can be judged, and sends the next sets.
+  void goOn();
   void startOnFreeWorkers();
   /// Sends the next set; sets that cannot be run get their result at once and are skipped.
   void startNext(int rank);

@@ -85,6 +85,25 @@ TEST_F(RankEvaluatorTest, WhoeverIsFreeGetsTheNextSetAndResultsStandInTheOrderOf
   EXPECT_EQ(launcher_.starts, 0);
 }
 
+TEST_F(RankEvaluatorTest, ResultsOfAWindowAreTakenInTheOrderOfItsSets) {
+  takeUp({{3, 3.0}});
+  RankEvaluator& master = makeMaster();
+  becomeReady(1);
+  becomeReady(2);
+  answerLargestFirst();
+  const auto results = evaluateInWindow(master, {2.0, 4.0, 3.0, 9.5, 6.0, 7.0}, 4);
+  EXPECT_THAT(measuresOf(results), ElementsAre(1.0, 3.0, 2.0, kFailedRunValue, 5.0, 6.0));
+  std::erase_if(observer_.events, [](const std::string& event) { return event.find("a=") == event.npos; });
+  // The smallest value, which is the first set, ends last of those that were submitted with it.
+  EXPECT_THAT(observer_.events, ElementsAre("replay 3 a=3 OK", "record 2 a=4 OK", "record 4 a=9.5 FAILED",
+                                            "record 1 a=2 OK", "record 6 a=7 OK", "record 5 a=6 OK"));
+  EXPECT_EQ(evaluate(master, {1.0}).at(0).number, 7);
+
+  job_.onReceive = [this](double) { observer_.cancelled = true; };
+  EXPECT_THROW(evaluateInWindow(master, {2.0, 4.0}, 2), RunCancelled);
+  EXPECT_TRUE(master.takeUnfinished().sets.empty());
+}
+
 TEST_F(RankEvaluatorTest, WorkersWaitForTheFirstSuccessfulRunWhosePairsTheirsNeed) {
   description_.minimumCoverage = 0.5;
   pairs_ = {{.count = 5}};
