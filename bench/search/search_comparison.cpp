@@ -304,6 +304,26 @@ void printOverlap() {
   }
 }
 
+void printOverlapBudget() {
+  fmt::print("\nMean / median best value over {} trials, centred optimum\n\n", kTrials);
+  fmt::print("| function | PSE 1000 | W = N/2 | W = N | W = 2N | PSE 5000 | W = N/2 | W = N | W = 2N |\n");
+  fmt::print("|---|---|---|---|---|---|---|---|---|\n");
+  for (const std::string name : {"Griewank 10-D", "Ackley 10-D", "Rastrigin 10-D", "Rosenbrock 10-D", "Hartman 6-D"}) {
+    const TestFunction function = functionNamed(name);
+    fmt::print("| {} |", name);
+    for (const auto& [complexes, budget] : {std::pair{2, 1000}, {5, 5000}}) {
+      const Setting alone{.method = Method::pse, .complexes = complexes, .budget = budget};
+      fmt::print(" {} |", meanAndMedianText(runTrials(function, alone, false, kTrials)));
+      for (const double inFlight : {0.5, 1.0, 2.0}) {
+        const Setting setting{.method = Method::opse, .complexes = complexes, .budget = budget, .inFlight = inFlight};
+        fmt::print(" {} |", meanAndMedianText(runTrials(function, setting, false, kTrials)));
+      }
+    }
+    fmt::print("\n");
+    std::fflush(stdout);
+  }
+}
+
 void printSmallComplexes() {
   for (const bool goesOn : {false, true}) {
     fmt::print("\nMean / median best value of SCE with 5 complexes after 5000 evaluations over {} trials{}\n\n",
@@ -350,7 +370,10 @@ int main(int argc, char** argv) {
   const std::string table = argc > 1 ? argv[1] : "";
   if (table.empty() || table == "success") mirevo::printSuccess();
   if (table.empty() || table == "budget") mirevo::printBudget();
-  if (table.empty() || table == "overlap") mirevo::printOverlap();
+  if (table.empty() || table == "overlap") {
+    mirevo::printOverlap();
+    mirevo::printOverlapBudget();
+  }
   if (table.empty() || table == "complexes") mirevo::printSmallComplexes();
   if (table.empty() || table == "surrogate") mirevo::printSurrogate();
   return 0;
