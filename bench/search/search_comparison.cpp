@@ -1,6 +1,6 @@
 /// Prints the tables of docs/algorithms/search-comparison.md. Usage: search_comparison [table], where the table is
-/// "success", "budget", "complexes", "candidates", "window" or "surrogate"; without an argument all of them. Trials
-/// have the seeds 1, 2, 3,
+/// "success", "budget", "complexes", "candidates", "window", "surrogate" or "overlap"; without an argument all of them.
+/// Trials have the seeds 1, 2, 3,
 /// ..., so that the figures are the same every time.
 
 #include <algorithm>
@@ -14,6 +14,7 @@
 #include <fmt/format.h>
 
 #include "algorithms/searches/dds.h"
+#include "algorithms/searches/opse.h"
 #include "algorithms/searches/pse.h"
 #include "algorithms/searches/sce.h"
 #include "algorithms/surrogate/proposal_selector.h"
@@ -124,7 +125,7 @@ constexpr int kSurrogateBudget = 6000;
 constexpr auto kQuadratic = SurrogateModelType::quadraticPolynomial;
 constexpr auto kGaussian = SurrogateModelType::gaussianProcess;
 
-enum class Method { sce, pse, dds };
+enum class Method { sce, pse, opse, dds };
 
 struct Setting {
   Method method = Method::sce;
@@ -134,6 +135,7 @@ struct Setting {
   SurrogateModelType modelType = SurrogateModelType::quadraticPolynomial;
   bool stopsAtTarget = false;
   int extraPoints = 0;               ///< points per complex beyond n + 1; 0 means n, that is 2n + 1 points
+  double inFlight = 0.5;             ///< of OPSE, sets for each point of the population
   bool goesOnWhenConverged = false;  ///< until the budget is used up, whatever the stopping tests say
   DdsSettings dds = {};
 };
@@ -193,6 +195,10 @@ Outcome runTrial(const TestFunction& function, const Setting& setting, int seed)
     search = std::make_unique<Sce>(SceSettings{setting.complexes, points, points}, SimplexSettings{n + 1}, problem);
   } else if (setting.method == Method::pse) {
     search = std::make_unique<Pse>(PseSettings{setting.complexes * (2 * n + 1)}, SimplexSettings{n + 1}, problem);
+  } else if (setting.method == Method::opse) {
+    const int points = setting.complexes * (2 * n + 1);
+    const int inFlight = std::max(1, static_cast<int>(setting.inFlight * points));
+    search = std::make_unique<Opse>(OpseSettings{{points}, inFlight}, SimplexSettings{n + 1}, problem);
   } else {
     search = std::make_unique<Dds>(setting.dds, setting.budget, false, bounds, evaluator, random);
   }
@@ -273,6 +279,51 @@ void printBudget() {
       fmt::print(" {} |", meanAndMedianText(runTrials(function, setting, false, kTrials)));
     }
     fmt::print("\n");
+  }
+}
+
+/// What OPSE costs, by the number of sets in flight relative to the population.
+void printOverlap() {
+  constexpr double kInFlight[] = {0.0, 0.25, 0.5, 0.75, 1.0, 1.5, 2.0};  // 0: one set
+  for (const int complexes : {4, 2}) {
+    fmt::print("\nSuccesses of {} / mean evaluations of the successful, shifted optimum, {}(2n + 1) points\n\n",
+               kTrials, complexes);
+    fmt::print("| function | PSE | W = 1 | N/4 | N/2 | 3N/4 | N | 3N/2 | 2N |\n");
+    fmt::print("|---|---|---|---|---|---|---|---|---|\n");
+    for (const std::string name :
+         {"Goldstein-Price 2-D", "Rosenbrock 2-D", "Six-hump camel-back 2-D", "Rastrigin 2-D", "Griewank 2-D",
+          "Shekel 4-D", "Rosenbrock 4-D", "Hartman 6-D", "Griewank 10-D", "Ackley 10-D"}) {
+      const TestFunction function = functionNamed(name);
+      const Setting alone{.method = Method::pse, .complexes = complexes, .stopsAtTarget = true};
+      fmt::print("| {} | {} |", name, successText(runTrials(function, alone, true, kTrials)));
+      for (const double inFlight : kInFlight) {
+        const Setting setting{
+            .method = Method::opse, .complexes = complexes, .stopsAtTarget = true, .inFlight = inFlight};
+        fmt::print(" {} |", successText(runTrials(function, setting, true, kTrials)));
+      }
+      fmt::print("\n");
+      std::fflush(stdout);
+    }
+  }
+}
+
+void printOverlapBudget() {
+  fmt::print("\nMean / median best value over {} trials, centred optimum\n\n", kTrials);
+  fmt::print("| function | PSE 1000 | W = N/2 | W = N | W = 2N | PSE 5000 | W = N/2 | W = N | W = 2N |\n");
+  fmt::print("|---|---|---|---|---|---|---|---|---|\n");
+  for (const std::string name : {"Griewank 10-D", "Ackley 10-D", "Rastrigin 10-D", "Rosenbrock 10-D", "Hartman 6-D"}) {
+    const TestFunction function = functionNamed(name);
+    fmt::print("| {} |", name);
+    for (const auto& [complexes, budget] : {std::pair{2, 1000}, {5, 5000}}) {
+      const Setting alone{.method = Method::pse, .complexes = complexes, .budget = budget};
+      fmt::print(" {} |", meanAndMedianText(runTrials(function, alone, false, kTrials)));
+      for (const double inFlight : {0.5, 1.0, 2.0}) {
+        const Setting setting{.method = Method::opse, .complexes = complexes, .budget = budget, .inFlight = inFlight};
+        fmt::print(" {} |", meanAndMedianText(runTrials(function, setting, false, kTrials)));
+      }
+    }
+    fmt::print("\n");
+    std::fflush(stdout);
   }
 }
 
@@ -363,6 +414,10 @@ int main(int argc, char** argv) {
   const std::string table = argc > 1 ? argv[1] : "";
   if (table.empty() || table == "success") mirevo::printSuccess();
   if (table.empty() || table == "budget") mirevo::printBudget();
+  if (table.empty() || table == "overlap") {
+    mirevo::printOverlap();
+    mirevo::printOverlapBudget();
+  }
   if (table.empty() || table == "complexes") mirevo::printSmallComplexes();
   if (table.empty() || table == "candidates") mirevo::printCandidates();
   if (table.empty() || table == "window") mirevo::printWindows();

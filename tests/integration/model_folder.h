@@ -15,6 +15,7 @@ namespace mirevo::testing {
 struct RunSettings {
   int option = 2;
   int algorithm = 2;
+  std::string search = {};  ///< by its name, instead of `algorithm`
   bool usesSurrogate = false;
   bool includesInitial = true;  ///< the initial set in a search's sample
   int aggregation = 0;
@@ -103,18 +104,20 @@ class ModelFolder : public TemporaryFolder {
             ? "    Use_Surrogate_Model = 1\n    [SURROGATE_MODEL_PARAMETERS]\n      Neighbourhood_Size = "
               "20\n      No_Initial_Generations = 2\n    [/SURROGATE_MODEL_PARAMETERS]\n"
             : "    Use_Surrogate_Model = 0\n";
+    const std::string search =
+        settings.search.empty() ? fmt::format("{}", settings.algorithm) : fmt::format("'{}'", settings.search);
     const bool saves = !settings.savedFile.empty();
     const std::string savedFiles =
         fmt::format("    [OUTPUT_FILE_1]\n      File_name = '{}'\n    [/OUTPUT_FILE_1]\n", settings.savedFile);
-    return fmt::format(
-        fmt::runtime(form), fmt::arg("option", settings.option), fmt::arg("algorithm", settings.algorithm),
-        fmt::arg("surrogate", surrogate), fmt::arg("includesInitial", settings.includesInitial),
-        fmt::arg("aggregation", settings.aggregation), fmt::arg("maxEvaluations", settings.maxEvaluations),
-        fmt::arg("slots", settings.slots), fmt::arg("restart", settings.restart),
-        fmt::arg("modelArguments", settings.modelArguments), fmt::arg("batchFile", settings.batchFile),
-        fmt::arg("processFolder", settings.processFolder), fmt::arg("savedCount", saves ? 1 : 0),
-        fmt::arg("savedFiles", saves ? savedFiles : ""), fmt::arg("scenarioType", scenarios.empty() ? 0 : 1),
-        fmt::arg("scenarioCount", settings.scenarios.size()), fmt::arg("scenarios", scenarios));
+    return fmt::format(fmt::runtime(form), fmt::arg("option", settings.option), fmt::arg("algorithm", search),
+                       fmt::arg("surrogate", surrogate), fmt::arg("includesInitial", settings.includesInitial),
+                       fmt::arg("aggregation", settings.aggregation),
+                       fmt::arg("maxEvaluations", settings.maxEvaluations), fmt::arg("slots", settings.slots),
+                       fmt::arg("restart", settings.restart), fmt::arg("modelArguments", settings.modelArguments),
+                       fmt::arg("batchFile", settings.batchFile), fmt::arg("processFolder", settings.processFolder),
+                       fmt::arg("savedCount", saves ? 1 : 0), fmt::arg("savedFiles", saves ? savedFiles : ""),
+                       fmt::arg("scenarioType", scenarios.empty() ? 0 : 1),
+                       fmt::arg("scenarioCount", settings.scenarios.size()), fmt::arg("scenarios", scenarios));
   }
 };
 

@@ -48,8 +48,11 @@ if test -e $tickets; then
   while test $n -gt 12; do sleep 0.05; done
 fi)");
   folder_.write("round", "none");
-  for (const RunSettings& settings : {RunSettings{.algorithm = 1, .usesSurrogate = true, .maxEvaluations = 60},
-                                      RunSettings{.option = 3, .maxEvaluations = 40}}) {
+  int kind = 0;
+  for (const RunSettings& settings :
+       {RunSettings{.algorithm = 1, .usesSurrogate = true, .maxEvaluations = 60},
+        RunSettings{.search = "OPSE", .maxEvaluations = 60}, RunSettings{.option = 3, .maxEvaluations = 40}}) {
+    ++kind;
     writeSetup(settings);
     run();
     const std::string expected = results();
@@ -57,8 +60,8 @@ fi)");
     folder_.editSetup("NoSimultaneousSim = 1", "NoSimultaneousSim = 3");
     // Each has made twelve runs of its own when it is killed.
     for (const int processes : {0, 3}) {
-      folder_.write("round", fmt::format("{}{}", settings.option, processes));
-      std::filesystem::create_directory(folder_ / fmt::format("tickets{}{}", settings.option, processes));
+      folder_.write("round", fmt::format("{}{}", kind, processes));
+      std::filesystem::create_directory(folder_ / fmt::format("tickets{}{}", kind, processes));
       RunningProgram program = processes == 0 ? RunningProgram({setup_}) : startJob(processes, {setup_});
       const auto rows = processes == 0 ? 12 : 24;
       ASSERT_TRUE(waitUntil([&] { return std::ssize(readDataTable(folder_.read(resultFile_)).rows) == rows; }));
@@ -143,15 +146,16 @@ TEST_F(Restart, AFinishedRunIsWalkedThroughAndEndsWithTheSameFile) {
 }
 
 TEST_F(Restart, ARaisedBudgetTakesAFinishedSearchFurther) {
-  for (const int algorithm : {0, 1}) {
-    writeSetup({.algorithm = algorithm, .usesSurrogate = algorithm == 1});
+  for (const RunSettings& settings :
+       {RunSettings{.algorithm = 0}, {.algorithm = 1, .usesSurrogate = true}, {.search = "OPSE"}}) {
+    writeSetup(settings);
     run();
     folder_.editSetup("Max_No_Evaluations = 40", "Max_No_Evaluations = 70");
     run();
     const std::string taken = results();
     removeResults();
     run();
-    EXPECT_EQ(taken, results()) << algorithm;
+    EXPECT_EQ(taken, results()) << settings.algorithm << settings.search;
     removeResults();
   }
 }

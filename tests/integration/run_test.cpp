@@ -90,9 +90,10 @@ TEST(Optimisation, ResultsAreTheSameBitsWhateverOrderTheModelRunsEndIn) {
   const ModelFolder folder;
   folder.useScript(kSleepByParameters);
   for (RunSettings settings :
-       {RunSettings{.algorithm = 1, .maxEvaluations = 50}, RunSettings{.option = 3, .maxEvaluations = 40}}) {
+       {RunSettings{.algorithm = 1, .maxEvaluations = 50}, RunSettings{.search = "OPSE", .maxEvaluations = 50},
+        RunSettings{.option = 3, .maxEvaluations = 40}}) {
     std::string ofOneSlot;
-    for (const int slots : {1, 2, 4}) {
+    for (const int slots : {1, 3, 8}) {
       settings.slots = slots;
       ASSERT_EQ(runProgram({folder.writeSetup(settings)}).exitCode, 0);
       const std::string results = withoutDates(folder.read(settings.resultFile())) + folder.read("basin_Series.dat");

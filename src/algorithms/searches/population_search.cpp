@@ -51,6 +51,10 @@ SearchStatus PopulationSearch::advance() {
   noteLoop();
   stopping_.update(population_.front().value(), summary_.evaluationCount, summary_.populationRange);
   summary_.terminationMessage = stopping_.message();
+  if (!isTerminated() || submittedCount_ == 0) return kSearchOk;
+  finish();
+  sortBestFirst(population_);
+  noteLoop();
   return kSearchOk;
 }
 
@@ -84,6 +88,19 @@ std::vector<std::optional<EvaluationResult>> PopulationSearch::evaluate(std::spa
   for (std::size_t i = 0; i < made.size() && problem_.selector; ++i) problem_.selector->note(proposals[i], made[i]);
   for (std::size_t i = 0; i < made.size(); ++i) results[i] = std::move(made[i]);
   return results;
+}
+
+void PopulationSearch::submit(const ParameterSet& proposal) {
+  assert(setsLeft() > 0);
+  problem_.evaluator.submit({&proposal, 1});
+  ++submittedCount_;
+}
+
+EvaluationResult PopulationSearch::awaitFirst() {
+  EvaluationResult result = problem_.evaluator.awaitFirst();
+  --submittedCount_;
+  ++summary_.evaluationCount;
+  return result;
 }
 
 bool PopulationSearch::isSelecting() const {

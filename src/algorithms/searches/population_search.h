@@ -19,8 +19,9 @@ struct PredictedMinimum;
 inline constexpr SearchStatus kSearchSettingsInvalid = 1;
 inline constexpr SearchStatus kSearchNotInitialised = 2;
 
-/// What SCE and PSE have in common: the initial sample, the batches within the evaluation budget, the stopping tests
-/// and the summary. The budget is never exceeded: a batch is cut to what is left of it, in the order of its proposals.
+/// What SCE, PSE and OPSE have in common: the initial sample, the batches within the evaluation budget, the stopping
+/// tests and the summary. The budget is never exceeded: a batch is cut to what is left of it, in the order of its
+/// proposals.
 class PopulationSearch : public SearchAlgorithm {
  public:
   SearchStatus initialise() final;
@@ -38,10 +39,18 @@ class PopulationSearch : public SearchAlgorithm {
   virtual std::size_t populationSize() const = 0;
   /// Makes one loop over `population_`, which is sorted best first before the call and need not be afterwards.
   virtual void makeLoop() = 0;
+  /// Takes what is still evaluated when the search ends.
+  virtual void finish() {}
 
   /// Evaluates proposals in one batch. The results are in the order of the proposals; empty for a proposal that was not
   /// run because the budget is used up.
   std::vector<std::optional<EvaluationResult>> evaluate(std::span<const ParameterSet> proposals);
+  /// Hands over a proposal that is evaluated beside those submitted before; setsLeft() must not be 0.
+  void submit(const ParameterSet& proposal);
+  /// The result of the proposal that was submitted first of those not taken yet.
+  EvaluationResult awaitFirst();
+  /// What is left of the budget when all that is submitted has been evaluated.
+  int setsLeft() const { return problem_.stopping.maxEvaluations - summary_.evaluationCount - submittedCount_; }
   /// How many proposals the search should make for each one that is evaluated: more than one where a surrogate model
   /// chooses among them.
   std::size_t proposalsPerRun() const;
@@ -85,6 +94,7 @@ class PopulationSearch : public SearchAlgorithm {
   FeasiblePoints feasible_;
   StoppingTests stopping_;
   SearchSummary summary_;
+  int submittedCount_ = 0;  ///< proposals that are submitted and not taken yet
 };
 
 }  // namespace mirevo

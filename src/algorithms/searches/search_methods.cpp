@@ -1,6 +1,7 @@
 #include "algorithms/searches/search_methods.h"
 
 #include "algorithms/searches/dds.h"
+#include "algorithms/searches/opse.h"
 #include "algorithms/searches/pdds.h"
 #include "algorithms/searches/pse.h"
 #include "algorithms/searches/sce.h"
@@ -9,7 +10,7 @@ namespace mirevo {
 
 const ChoiceTable<SearchMethod>& searchMethods() {
   /// A new search is added here.
-  static const auto searches = ChoiceTable<SearchMethod>::of<SceMethod, PseMethod, DdsMethod, PddsMethod>();
+  static const auto searches = ChoiceTable<SearchMethod>::of<SceMethod, PseMethod, DdsMethod, PddsMethod, OpseMethod>();
   return searches;
 }
 

@@ -9,6 +9,7 @@
 
 #include "algorithms/function_evaluator.h"
 #include "algorithms/searches/dds.h"
+#include "algorithms/searches/opse.h"
 #include "algorithms/searches/pse.h"
 #include "algorithms/searches/sce.h"
 #include "algorithms/surrogate/proposal_selector.h"
@@ -90,6 +91,7 @@ TEST(FeasiblePoints, RefuseASampleBeforeItIsEvaluatedWhereNoneCanBeFound) {
 std::unique_ptr<SearchAlgorithm> makeSearch(const std::string& name, const SearchProblem& problem) {
   if (name == "SCE") return std::make_unique<Sce>(SceSettings{2, 5, 5}, SimplexSettings{3}, problem);
   if (name == "PSE") return std::make_unique<Pse>(PseSettings{20}, SimplexSettings{3}, problem);
+  if (name == "OPSE") return std::make_unique<Opse>(OpseSettings{{20}, 10}, SimplexSettings{3}, problem);
   return std::make_unique<Dds>(DdsSettings{}, problem.stopping.maxEvaluations,
                                problem.initialSample.includeInitialParameters, problem.bounds, problem.evaluator,
                                problem.random, problem.feasibility);
@@ -122,7 +124,7 @@ ParameterSet search(const std::string& name, bool usesSurrogate, const Feasibili
 class SearchWithConstraint : public ::testing::TestWithParam<std::pair<const char*, bool>> {};
 INSTANTIATE_TEST_SUITE_P(Searches, SearchWithConstraint,
                          ::testing::Values(std::pair{"SCE", false}, std::pair{"SCE", true}, std::pair{"PSE", false},
-                                           std::pair{"PSE", true}, std::pair{"DDS", false}),
+                                           std::pair{"PSE", true}, std::pair{"OPSE", false}, std::pair{"DDS", false}),
                          [](const auto& instance) {
                            return std::string(instance.param.first) + (instance.param.second ? "Surrogate" : "");
                          });

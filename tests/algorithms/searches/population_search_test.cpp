@@ -11,6 +11,7 @@
 #include <gtest/gtest.h>
 
 #include "algorithms/function_evaluator.h"
+#include "algorithms/searches/opse.h"
 #include "algorithms/searches/pse.h"
 #include "algorithms/searches/sce.h"
 #include "algorithms/surrogate/proposal_selector.h"
@@ -22,7 +23,7 @@ namespace {
 
 using testing::boundsOf;
 
-enum class Kind { sce, pse };
+enum class Kind { sce, pse, opse };
 
 /// With the settings that are usual, or another number of evolution steps in a loop of SCE.
 std::unique_ptr<PopulationSearch> makeSearch(Kind kind, int complexes, const SearchProblem& problem, int steps = 0) {
@@ -30,7 +31,9 @@ std::unique_ptr<PopulationSearch> makeSearch(Kind kind, int complexes, const Sea
   const SimplexSettings simplex{n + 1};
   if (steps == 0) steps = 2 * n + 1;
   if (kind == Kind::sce) return std::make_unique<Sce>(SceSettings{complexes, 2 * n + 1, steps}, simplex, problem);
-  return std::make_unique<Pse>(PseSettings{complexes * (2 * n + 1)}, simplex, problem);
+  const PseSettings pse{complexes * (2 * n + 1)};
+  if (kind == Kind::pse) return std::make_unique<Pse>(pse, simplex, problem);
+  return std::make_unique<Opse>(OpseSettings{pse, pse.populationSize / 2}, simplex, problem);
 }
 
 /// Looks after each loop whether the best point is kept.
@@ -57,9 +60,15 @@ SearchSummary search(Kind kind, int complexes, const SearchBounds& bounds, int b
   return runToEnd(*makeSearch(kind, complexes, {bounds, onBudget(budget), {}, {}, evaluator, random, selector}));
 }
 
+std::string nameOf(const ::testing::TestParamInfo<Kind>& instance) {
+  return instance.param == Kind::sce ? "Sce" : instance.param == Kind::pse ? "Pse" : "Opse";
+}
+
 class EitherSearch : public ::testing::TestWithParam<Kind> {};
-INSTANTIATE_TEST_SUITE_P(Searches, EitherSearch, ::testing::Values(Kind::sce, Kind::pse),
-                         [](const auto& instance) { return instance.param == Kind::sce ? "Sce" : "Pse"; });
+INSTANTIATE_TEST_SUITE_P(Searches, EitherSearch, ::testing::Values(Kind::sce, Kind::pse, Kind::opse), nameOf);
+
+class SurrogateSearch : public ::testing::TestWithParam<Kind> {};
+INSTANTIATE_TEST_SUITE_P(Searches, SurrogateSearch, ::testing::Values(Kind::sce, Kind::pse), nameOf);
 
 TEST_P(EitherSearch, FindsPublishedOptima) {
   for (const auto& [name, complexes, budget] :
@@ -147,7 +156,7 @@ TEST_P(EitherSearch, RefusesStepsAndSettingsThatMakeNoSense) {
   EXPECT_EQ(evaluator.evaluationCount, 0);
 }
 
-TEST_P(EitherSearch, IsHelpedByTheSurrogateModelWithinTheSameBudgetAndRules) {
+TEST_P(SurrogateSearch, IsHelpedByTheSurrogateModelWithinTheSameBudgetAndRules) {
   const SearchBounds bounds{{-5, -2}, {5, 8}, {0, 0}};
   std::map<int, int> successes;  // of ten seeds, by type; -1 alone
   for (const int type : {-1, 0, 1}) {
@@ -166,7 +175,7 @@ TEST_P(EitherSearch, IsHelpedByTheSurrogateModelWithinTheSameBudgetAndRules) {
   EXPECT_GE(successes[1], successes[-1] + 3);
 }
 
-TEST_P(EitherSearch, PutsAPredictedMinimumInThePlaceOfThePointThatItRefines) {
+TEST_P(SurrogateSearch, PutsAPredictedMinimumInThePlaceOfThePointThatItRefines) {
   const SearchBounds bounds{{-5, -5}, {5, 5}, {0, 0}};
   const auto bowl = [](const ParameterSet& x) { return 1.0 + (x[0] - 1) * (x[0] - 1) + 2 * (x[1] + 2) * (x[1] + 2); };
   FunctionEvaluator evaluator([&bowl](const ParameterSet& x) { return resultOf(bowl(x)); });

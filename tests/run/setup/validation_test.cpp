@@ -171,12 +171,14 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
        "Perturbed value for parameter Depth in local sensitivity analysis out of bounds",
        "0.75 of the range, from 412.5, leaves the bounds 100 to 900 both ways (logarithms)"},
       {"Upper_Bound = 1.0 => 0.31 & Lower_Bound = 0.0 => 0.31", "Lower bound equal to upper bound for parameter Rate",
-       "expected more than 0.31 for a search by SCE or PSE; Parameter_Type = 1 fixes a parameter"},
+       "expected more than 0.31 for a search by SCE or PSE or OPSE; Parameter_Type = 1 fixes a parameter"},
       {"Algorithm_Type = 1 => 0 & No_Points_Subcomplex = 6 => 8",
        "No. of points in a subcomplex in SCE algorithm invalid", "at most the 7 points of a complex, found 8"},
       {"No_Points_Simplex = 5 => 21", "No. of points in a simplex in PSE algorithm invalid", "at most the 20 points"},
       {"Prob_Contraction = 0.4 => 0.5",
        "Sum of probabilities for reflection and contraction in PSE algorithm larger than 1", "found 0.6 + 0.5"},
+      {"Algorithm_Type = 1 => 'OPSE' & No_Points_Simplex = 3 => 13",
+       "No. of points in a simplex in OPSE algorithm invalid", "at most the 12 points"},
       {"Algorithm_Type = 1 => 2 & NoSimultaneousSim = 4 => 1 & Max_No_Evaluations = 500 => 0",
        "Maximum No. of model evaluations in DDS algorithm invalid", ""},
       {"'sample.txt' => '/dev/zero'", "Unable to open /dev/zero", "Not a regular file"},
@@ -279,7 +281,7 @@ std::vector<RowInSetup> rowsInSetups(const std::string& setup) {
   static const std::pair<std::string_view, const char*> kOptions[] = {
       {"SCENARIOS", "0"}, {"SENSITIVITY_ANALYSIS", "1"}, {"UNCERTAINTY_ESTIMATION", "3"}};
   static const std::pair<std::string_view, const char*> kAlgorithms[] = {
-      {"SCE_", "0"}, {"DDS_", "2"}, {"PDDS_", "'PDDS'"}};
+      {"SCE_", "0"}, {"DDS_", "2"}, {"PDDS_", "'PDDS'"}, {"OPSE_", "'OPSE'"}};
   std::vector<RowInSetup> found;
   for (const SectionRow* section : setupSchema().sections()) {
     std::string text = setup;

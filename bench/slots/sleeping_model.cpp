@@ -1,0 +1,70 @@
+// A model that sleeps: sleeping_model (equal|exponential) MEAN-SECONDS LOG
+//
+// It reads `parameters.txt`, one value a line, sleeps, and writes the value of a function of the parameters as the
+// series `simulated.csv`. How long it sleeps depends on the parameters alone: the mean, or a time that is exponentially
+// distributed over different parameters. It appends its start and end to the log, in seconds of the monotonic clock.
+#include <bit>
+#include <chrono>
+#include <cmath>
+#include <cstdint>
+#include <cstdio>
+#include <cstdlib>
+#include <fcntl.h>
+#include <fstream>
+#include <string_view>
+#include <thread>
+#include <unistd.h>
+#include <vector>
+
+namespace {
+
+double now() {
+  return std::chrono::duration<double>(std::chrono::steady_clock::now().time_since_epoch()).count();
+}
+
+/// A number in (0, 1) that the parameters tell: their bits, mixed.
+double uniformOf(const std::vector<double>& parameters) {
+  std::uint64_t bits = 0;
+  for (const double value : parameters) {
+    bits = (bits ^ std::bit_cast<std::uint64_t>(value)) * 0x9E3779B97F4A7C15U;
+    bits ^= bits >> 29;
+    bits *= 0xBF58476D1CE4E5B9U;
+    bits ^= bits >> 32;
+  }
+  return (static_cast<double>(bits >> 11) + 0.5) / 9007199254740992.0;
+}
+
+/// Ackley's function about (1, 1, ...).
+double ackley(const std::vector<double>& parameters) {
+  double squares = 0.0;
+  double cosines = 0.0;
+  for (const double value : parameters) {
+    squares += (value - 1.0) * (value - 1.0);
+    cosines += std::cos(2.0 * std::acos(-1.0) * (value - 1.0));
+  }
+  const auto n = static_cast<double>(parameters.size());
+  return 20.0 - 20.0 * std::exp(-0.2 * std::sqrt(squares / n)) + std::exp(1.0) - std::exp(cosines / n);
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  const double start = now();
+  if (argc != 4) return 2;
+  std::vector<double> parameters;
+  std::ifstream file("parameters.txt");
+  for (double value = 0.0; file >> value;) parameters.push_back(value);
+  if (parameters.empty()) return 2;
+  const bool isEqual = std::string_view(argv[1]) == "equal";
+  const double mean = std::atof(argv[2]);
+  const double seconds = isEqual ? mean : -mean * std::log(uniformOf(parameters));
+  std::this_thread::sleep_for(std::chrono::duration<double>(seconds));
+  std::ofstream series("simulated.csv");
+  series << "time,value\n";
+  for (const int day : {1, 2, 3}) series << "2001-01-0" << day << "," << ackley(parameters) << "\n";
+  series.close();
+  char line[80];
+  const int length = std::snprintf(line, sizeof line, "%.6f %.6f\n", start, now());
+  const int log = ::open(argv[3], O_WRONLY | O_APPEND | O_CREAT, 0666);
+  return log >= 0 && ::write(log, line, static_cast<std::size_t>(length)) == length ? 0 : 2;
+}
