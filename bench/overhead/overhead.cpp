@@ -3,15 +3,19 @@
 // kept busy; and whether an evaluation takes longer the longer a run goes on.
 //
 //   overhead [FOLDER]... folders to work in, one per file system (default: /dev/shm and the temporary folder)
-//   overhead --short [FOLDER]...   the comparison with one slot alone
+//   overhead --short [FOLDER]...   the comparison with one slot, and the start of the program, alone
 //
 // The three take turns in short rounds, so that other load on the machine affects all of them; each figure is the
 // median of the rounds, a ratio the median of their ratios. The model is the small one of the tests: it reads its
 // parameter file and writes 365 values. In the bare loop it truncates the file of its last run, which the program would
 // have removed. The last two columns are ratios of processor time, of which other load takes no share.
 #include <algorithm>
+#include <fcntl.h>
 #include <filesystem>
+#include <spawn.h>
+#include <string>
 #include <sys/resource.h>
+#include <sys/wait.h>
 #include <unistd.h>
 #include <vector>
 
@@ -80,6 +84,30 @@ void compareWithBareLoop(const std::string& folder, int slotCount) {
              ratio(program.processor, bare.processor));
 }
 
+/// Processor time of the program from its start to its end, after it has printed its help.
+void startProgram() {
+  constexpr int kStarts = 31;
+  std::string program = MIREVO_PROGRAM;
+  std::string argument = "--help";
+  char* const arguments[] = {program.data(), argument.data(), nullptr};
+  posix_spawn_file_actions_t quiet;
+  posix_spawn_file_actions_init(&quiet);
+  posix_spawn_file_actions_addopen(&quiet, STDOUT_FILENO, "/dev/null", O_WRONLY, 0);
+  std::vector<double> seconds;
+  for (int start = 0; start < kStarts; ++start) {
+    const double before = processorSeconds();
+    pid_t process = 0;
+    int status = 0;
+    if (::posix_spawn(&process, program.c_str(), &quiet, nullptr, arguments, environ) != 0 ||
+        ::waitpid(process, &status, 0) != process || status != 0) {
+      mirevo::fatalError("the program failed", program);
+    }
+    seconds.push_back(processorSeconds() - before);
+  }
+  posix_spawn_file_actions_destroy(&quiet);
+  fmt::print("\nstart of the program: {:.1f} ms of processor time\n", median(seconds) * 1e3);
+}
+
 void keepSlotsBusy(const std::string& folder) {
   constexpr int kRuns = 100;
   constexpr double kModelSeconds = 0.2;
@@ -126,6 +154,7 @@ int main(int argc, char** argv) {
         if (slotCount == 1 || !isShort) compareWithBareLoop(folder, slotCount);
       }
     }
+    startProgram();
     if (isShort) return 0;
     keepSlotsBusy(folders.front());
     lookForGrowth(folders.front());
