@@ -28,7 +28,8 @@ struct ChildTask {
   int error = 0;
 };
 
-[[noreturn]] void giveUp(ChildTask& task, const char* step) {
+/// On a stack that the sanitizers do not know, like runChild().
+[[noreturn]] __attribute__((no_sanitize("address", "undefined"))) void giveUp(ChildTask& task, const char* step) {
   task.error = errno;
   task.failedStep = step;
   ::_exit(127);
