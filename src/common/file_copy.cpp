@@ -81,7 +81,11 @@ bool copyContent(int from, int to) {
 
 bool putBackIfRemoved(int descriptor, const std::string& path) {
   struct stat status {};
-  if (::fstat(descriptor, &status) != 0 || status.st_nlink > 0 || !S_ISREG(status.st_mode)) return true;
+  return ::fstat(descriptor, &status) != 0 || putBackIfRemoved(descriptor, path, status);
+}
+
+bool putBackIfRemoved(int descriptor, const std::string& path, const struct stat& status) {
+  if (status.st_nlink > 0 || !S_ISREG(status.st_mode)) return true;
   const Descriptor file(::open(path.c_str(), O_RDWR | O_CREAT | O_EXCL | O_CLOEXEC, status.st_mode & 07777));
   if (file.get() < 0) return false;
   ::lseek(descriptor, 0, SEEK_SET);

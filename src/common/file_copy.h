@@ -1,6 +1,7 @@
 #pragma once
 
 #include <string>
+#include <sys/stat.h>
 
 namespace mirevo {
 
@@ -17,5 +18,7 @@ bool copyWhole(const std::string& source, const std::string& target, std::string
 /// readable, too, then refers to the new file, at its end. Does nothing if the file is there. False, with the reason in
 /// errno, when that fails; EEXIST if another file has taken its name.
 bool putBackIfRemoved(int descriptor, const std::string& path);
+/// The same where the caller has just called fstat() on the descriptor.
+bool putBackIfRemoved(int descriptor, const std::string& path, const struct stat& status);
 
 }  // namespace mirevo

@@ -14,6 +14,7 @@
 #include "common/descriptor.h"
 #include "common/descriptor_output.h"
 #include "common/fatal_error.h"
+#include "common/large_pages.h"
 #include "common/reading_watch.h"
 #include "common/text.h"
 
@@ -81,10 +82,10 @@ std::optional<std::string> readBytes(const std::string& path, std::size_t length
   reason = faultOfKind(status);
   if (reason.empty() && watch != nullptr) reason = whyNoMemory(static_cast<std::uintmax_t>(status.st_size));
   if (!reason.empty()) return std::nullopt;
-  constexpr std::size_t kMostAtOnce = std::size_t{1} << 24;  // of which each part takes a moment
+  constexpr std::size_t kMostAtOnce = std::size_t{1} << 18;  // in the processor's cache from its zeroes to its bytes
   const std::size_t expected = std::min(static_cast<std::size_t>(status.st_size), length);
   std::string content;
-  content.reserve(expected + 1);  // the last byte is for finding the end without moving the rest
+  reserveToFill(content, expected + 1);  // the last byte is for finding the end without moving the rest
   std::size_t size = 0;
   while (size < length) {
     if (size == content.size()) {

@@ -28,24 +28,28 @@ std::string faultOfAccess(const std::string& path, int access) {
   return ::access(path.c_str(), access) == 0 ? std::string() : std::strerror(errno);
 }
 
-/// Whether not even its owner may remove the file, as for each run (`chattr +i`, `chattr +a`).
-bool isUnremovable(const std::string& path) {
+/// Of a file below `folder`, in which files may be made and removed.
+std::string faultOfParameterFile(const std::string& folder, const std::string& file) {
   struct statx status {};
-  return ::statx(AT_FDCWD, path.c_str(), 0, STATX_TYPE, &status) == 0 &&
-         (status.stx_attributes & (STATX_ATTR_IMMUTABLE | STATX_ATTR_APPEND)) != 0;
-}
-
-std::string faultOfParameterFile(const std::string& path) {
-  std::string fault = faultOfFile(path);
-  if (fault.empty() && isUnremovable(path)) fault = "it is immutable or append-only";
-  return fault.empty() ? faultOfAccess(folderOf(path), W_OK | X_OK) : fault;
+  const bool isKnown = ::statx(AT_FDCWD, (folder + file).c_str(), 0, STATX_TYPE, &status) == 0;
+  std::string fault = isKnown && S_ISREG(status.stx_mode) ? std::string() : faultOfFile(folder + file);
+  // Not even its owner may remove it then, as for each run (`chattr +i`, `chattr +a`).
+  if (fault.empty() && isKnown && (status.stx_attributes & (STATX_ATTR_IMMUTABLE | STATX_ATTR_APPEND)) != 0) {
+    fault = "it is immutable or append-only";
+  }
+  const std::string within = folderOf(file);
+  return fault.empty() && !within.empty() ? faultOfAccess(folder + within, W_OK | X_OK) : fault;
 }
 
 /// A folder that is not there, the model may make in each run.
-std::string faultOfOutput(const std::string& path) {
-  if (typeOf(folderOf(path)) == 0) return {};
-  std::string fault = faultOfAccess(folderOf(path), W_OK | X_OK);
-  return fault.empty() && typeOf(path) == S_IFDIR ? std::strerror(EISDIR) : fault;
+std::string faultOfOutput(const std::string& folder, const std::string& file) {
+  const std::string within = folderOf(file);
+  if (!within.empty()) {
+    if (typeOf(folder + within) == 0) return {};
+    std::string fault = faultOfAccess(folder + within, W_OK | X_OK);
+    if (!fault.empty()) return fault;
+  }
+  return typeOf(folder + file) == S_IFDIR ? std::strerror(EISDIR) : std::string();
 }
 
 }  // namespace
@@ -71,11 +75,11 @@ std::optional<FolderDamage> findDamage(const std::string& folder, const FolderNe
     return FolderDamage{fmt::format("{} {}{}", what, folder, file), std::move(why)};
   };
   for (const std::string& file : needs.parameterFiles) {
-    std::string why = faultOfParameterFile(folder + file);
+    std::string why = faultOfParameterFile(folder, file);
     if (!why.empty()) return damageOf("Unable to open", file, std::move(why));
   }
   for (const std::string& file : needs.outputs) {
-    std::string why = faultOfOutput(folder + file);
+    std::string why = faultOfOutput(folder, file);
     if (!why.empty()) return damageOf("Unable to remove", file, std::move(why));
   }
   for (const std::string& file : needs.batchFiles) {

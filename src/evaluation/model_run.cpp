@@ -238,6 +238,7 @@ std::optional<FolderDamage> ModelRunner::renewIfDamaged(int slot, std::vector<st
   if (!damage) damage = removeResults(files);
   if (!damage) {
     files.isRenewed = false;
+    files.isCleared = true;
     return std::nullopt;
   }
   if (files.isRenewed) return damage;
@@ -273,7 +274,8 @@ std::optional<EvaluationFailure> ModelRunner::prepareModelRun(std::span<const do
   if (auto failure = findUnwritable(modelValues)) return failure;
   SlotFiles& files = slots_.at(static_cast<std::size_t>(slot - 1));
   files.isUsed = true;
-  if (const auto damage = removeResults(files)) fatalError("Error: " + damage->what, damage->why);
+  const auto damage = std::exchange(files.isCleared, false) ? std::nullopt : removeResults(files);
+  if (damage) fatalError("Error: " + damage->what, damage->why);
   savedFiles_.markAsOld(launcher_.getProcessFolder(slot));
   for (std::size_t i = 0; i < templates_.size(); ++i) {
     const std::string& path = files.parameterFiles[i];

@@ -87,6 +87,7 @@ class ModelRunner final {
     std::vector<std::string> parameterFiles;  ///< in the order of ModelDescription::parameterFiles
     OutputFiles output;
     bool isUsed = false;     ///< a model has run in the folder
+    bool isCleared = false;  ///< it has no results of an earlier run, as has just been seen to
     bool isRenewed = false;  ///< it was made anew, and no run has left it whole since
     double started = 0.0;    ///< when the model run was, by runTimeClock() - readingSeconds_
   };

@@ -10,6 +10,7 @@
 
 #include "common/calendar.h"
 #include "common/fatal_error.h"
+#include "common/large_pages.h"
 #include "common/text.h"
 #include "measures/dates.h"
 #include "measures/statistics.h"
@@ -148,6 +149,9 @@ MeasureStatistics collectPairs(const OutputMeasure& measure, const SeriesItem& s
   MeasureStatistics statistics;
   std::optional<double> firstUnused;
   double sumOfObserved = 0.0;
+  for (auto* values : {&statistics.times, &statistics.simulatedValues, &statistics.observedValues}) {
+    reserveToFill(*values, observation.series.times().size());
+  }
   forEachObservation(measure, simulation, observation, period,
                      [&](double time, double observed, double weight, const std::optional<double>& simulated) {
                        ++statistics.observationCount;

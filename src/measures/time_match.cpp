@@ -63,23 +63,26 @@ TimeMatcher::TimeMatcher(const TimeMatching& matching, const TimeSeriesObject& s
                          double largestGap)
     : matching_(matching),
       simulation_(simulation),
+      times_(simulation.times()),
+      deleteValue_(simulation.deleteValue()),
       start_(secondNumber(start)),
       largestGap_(matching.kind == TimeMatch::exact ? 0.0 : largestGap) {
-  if (matching.kind == TimeMatch::mean) usualStep_ = medianStep(simulation.times());
+  if (matching.kind == TimeMatch::mean) usualStep_ = medianStep(times_);
 }
 
 std::optional<float> TimeMatcher::valueAt(int item, double days, std::size_t& hint) const {
   if (matching_.kind == TimeMatch::mean) {
-    const auto mean = dayMean(simulation_.values(item), simulation_.deleteValue(), days);
+    const auto mean = dayMean(simulation_.values(item), deleteValue_, days);
     return mean ? std::optional(static_cast<float>(*mean)) : std::nullopt;
   }
-  return mirevo::valueAt(simulation_, item, days + matching_.offsetHours / kHoursPerDay, hint, largestGap_);
+  return mirevo::valueAt(times_, simulation_.values(item), deleteValue_, days + matching_.offsetHours / kHoursPerDay,
+                         hint, largestGap_);
 }
 
 std::optional<double> TimeMatcher::exactValueAt(std::span<const double> values, double days, std::size_t& hint) const {
   if (matching_.kind == TimeMatch::mean) return dayMean(values, std::nullopt, days);
   const double time = days + matching_.offsetHours / kHoursPerDay;
-  return mirevo::exactValueAt(simulation_.times(), values, time, hint, largestGap_);
+  return mirevo::exactValueAt(times_, values, time, hint, largestGap_);
 }
 
 /// The mean of the steps from the beginning of the day on and before its end. Each step is taken to reach to the next
@@ -92,7 +95,7 @@ std::optional<double> TimeMatcher::dayMean(std::span<const Value> values, std::o
   const double begin =
       (static_cast<double>(midnight - start_) + (hours + matching_.offsetHours) * kSecondsPerHour) / kSecondsPerDay;
   const double end = begin + 1.0;
-  const std::span<const double> times = simulation_.times();
+  const std::span<const double> times = times_;
   const auto first = std::lower_bound(times.begin(), times.end(), begin - kSameTimeDays);
   const auto stop = std::lower_bound(first, times.end(), end - kSameTimeDays);
   if (first == stop || *first - begin > std::max(usualStep_ - kSameTimeDays, kSameTimeDays) ||

@@ -57,6 +57,8 @@ class TimeMatcher {
 
   TimeMatching matching_;
   const TimeSeriesObject& simulation_;
+  std::span<const double> times_;  ///< of the simulation, like its delete value: asked for once and not for each value
+  std::optional<float> deleteValue_;
   std::int64_t start_;      ///< secondNumber() of the first step
   double largestGap_;       ///< days
   double usualStep_ = 0.0;  ///< the median of the time between two steps, days; 0: there is one step

@@ -309,7 +309,8 @@ long syscall(long number, ...) noexcept {
   for (long& value : values) value = va_arg(arguments, long);
   va_end(arguments);
   static auto* const real = original<long(long, ...)>("syscall");
-  if (settings.isOld && (number == SYS_pidfd_open || number == SYS_close_range)) {
+  // Without clone3 the program starts processes by clone(), which can fail here.
+  if (number == SYS_clone3 || (settings.isOld && (number == SYS_pidfd_open || number == SYS_close_range))) {
     errno = ENOSYS;
     return -1;
   }

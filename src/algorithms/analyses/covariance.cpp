@@ -159,8 +159,7 @@ std::vector<double> coefficients(std::span<const double> factor, std::size_t k, 
 std::size_t factorise(std::vector<double>& gram, std::size_t k, std::span<const double> noise) {
   const int n = static_cast<int>(k);
   int info = 0;
-  useOneLapackThread();
-  dpotrf_("U", &n, gram.data(), &n, &info);
+  lapack().dpotrf("U", &n, gram.data(), &n, &info);
   const std::size_t sound = info > 0 ? static_cast<std::size_t>(info - 1) : k;
   for (std::size_t i = 0; i < sound; ++i) {
     const double pivot = gram[i * k + i];
@@ -207,7 +206,7 @@ std::vector<double> invertWhatCanBe(const WeightedModel& weighted, std::span<con
   if (!gram.empty()) {
     const int n = static_cast<int>(result.kept.size());
     int info = 0;
-    dpotri_("U", &n, gram.data(), &n, &info);
+    lapack().dpotri("U", &n, gram.data(), &n, &info);
     assert(info == 0);
   }
   std::sort(result.leftOut.begin(), result.leftOut.end(),

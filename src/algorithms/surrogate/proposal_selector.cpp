@@ -8,6 +8,7 @@
 
 #include <fmt/format.h>
 
+#include "algorithms/numbers/lapack_functions.h"
 #include "algorithms/surrogate/gaussian_process.h"
 #include "algorithms/surrogate/pattern_search.h"
 #include "algorithms/surrogate/quadratic_surrogate.h"
@@ -147,7 +148,9 @@ ProposalSelector::ProposalSelector(const SurrogateSettings& settings, SearchBoun
     : settings_(settings),
       bounds_(std::move(bounds)),
       feasibility_(std::move(feasibility)),
-      model_(makeModel(settings.modelType)) {}
+      model_(makeModel(settings.modelType)) {
+  lapack();  // what the models need is missed now, if ever, and not after the initial sample
+}
 
 std::vector<double> ProposalSelector::scaled(const ParameterSet& set) const {
   std::vector<double> point(set.size());

@@ -7,14 +7,13 @@
 
 namespace mirevo {
 
-// MPI is in a module of its own, platform/jobs/mpi, which only a process of an MPI job loads: the program itself needs
-// no MPI library. What both use is the program's (platform/jobs/mpi/exported_symbols): no state and no type twice.
+// MPI is in a module of its own (common/program_module.h), platform/jobs/mpi, which only a process of an MPI job loads:
+// the program itself needs no MPI library. What both use is the program's (platform/jobs/mpi/exported_symbols): no
+// state and no type twice.
 
 /// What the module exports, under the names below.
 using JoinMpiJob = Job*();
 inline constexpr const char* kJoinMpiJobName = "mirevoJoinMpiJob";
-
-inline constexpr const char* kModuleVersionName = "mirevoModuleVersion";
 
 /// The module's entry: initialises MPI and returns the job, to be deleted by the caller; null if this process finds
 /// itself alone in it. Throws FatalError when `mirevo::launchedProcessCount()` says that it should not be.

@@ -56,12 +56,16 @@ std::string describe(const LeavingLink& link) {
 }
 
 std::optional<LeavingLink> findLeavingLink(const std::string& folder, std::string_view path) {
-  const std::string root = resolvedPath(folder);
-  fs::path at = root;
+  std::string root;  // resolved at the first link only, as most paths have none and are looked at for every run
+  fs::path at = folder;
   const fs::path below = fs::path(path).relative_path();
   for (auto part = below.begin(); part != below.end(); ++part) {
     at /= *part;
     if (!isLink(at)) continue;
+    if (root.empty()) {
+      root = resolvedPath(folder);
+      at = root / at.lexically_relative(folder);
+    }
     const bool isForFolder = std::next(part) != below.end();
     std::error_code failed;
     static_cast<void>(fs::read_symlink(at, failed));

@@ -130,6 +130,7 @@ bool PosixProcessLauncher::initialise(const LauncherSettings& settings) {
   slots_.clear();
   // If this signal was ignored at the start of the program, the kernel would discard how its children ended.
   ::signal(SIGCHLD, SIG_DFL);
+  ignoredSignals_ = ignoredSignals();
   graceSeconds_ = settings.graceSeconds;
   maxSeconds_ = settings.maxSeconds;
   baseFolder_ = settings.baseFolder;
@@ -304,7 +305,7 @@ void PosixProcessLauncher::createProcesses(int slotNumber) {
 void PosixProcessLauncher::startItem(Slot& slot) {
   const SpawnCommand& command = slot.commands[slot.item];
   environment_[environment_.size() - 2] = slot.mark.data();
-  const SpawnSurroundings surroundings{environment_.data(), nullInput_, slot.log, &groupEntry(slot)};
+  const SpawnSurroundings surroundings{environment_.data(), nullInput_, slot.log, &groupEntry(slot), ignoredSignals_};
   const SpawnedProcess process = spawnProcess(command, surroundings);
   if (process.error == 0) {
     slot.pidfd = process.pidfd;

@@ -96,6 +96,7 @@ class PosixProcessLauncher final : public ProcessLauncher {
   std::vector<std::string> environmentTexts_;
   std::vector<char*> environment_;  ///< the last but one is the slot's mark
   int nullInput_ = -1;
+  std::vector<int> ignoredSignals_;
   std::unique_ptr<ProcessGroupTable> groups_;
   std::unique_ptr<ChildGuard> guard_;
   std::unique_ptr<LeftProcesses> left_;

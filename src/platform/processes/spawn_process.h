@@ -2,6 +2,7 @@
 
 #include <atomic>
 #include <memory>
+#include <span>
 #include <string>
 #include <sys/types.h>
 #include <vector>
@@ -39,7 +40,11 @@ struct SpawnSurroundings {
   int standardInput = -1;                    ///< descriptor above 2
   int standardOutput = -1;                   ///< descriptor above 2; standard error as well
   std::atomic<pid_t>* groupEntry = nullptr;  ///< receives the group before the command can start a process of its own
+  std::span<const int> ignoredSignals = {};  ///< by this program, see ignoredSignals()
 };
+
+/// The signals that this process ignores, as its children would, too.
+std::vector<int> ignoredSignals();
 
 /// A process that was started, or why it was not.
 struct SpawnedProcess {

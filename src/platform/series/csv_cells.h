@@ -52,6 +52,20 @@ class DateScanner final {
   std::optional<std::int64_t> scan(const char*& at, const char* end);
   /// scan() of a whole cell: surrounding blanks and quotes are allowed. `at` is moved to what follows.
   std::optional<std::int64_t> scanCell(const char*& at, const char* end);
+  /// scanCell() of the usual cell, "YYYY-MM-DD HH:MM" before a separator, if it is on the last day; else empty, with
+  /// `at` where it was.
+  std::optional<std::int64_t> scanOnLastDay(const char*& at, const char* end, char separator) {
+    constexpr std::ptrdiff_t kLength = 16;
+    if (end - at <= kLength || at[kLength] != separator || at[13] != ':' || (at[10] != ' ' && at[10] != 'T')) return {};
+    if (std::memcmp(at, lastDay_.data(), lastDay_.size()) != 0) return {};
+    const auto digit = [&at](int place) { return static_cast<unsigned>(at[place]) - unsigned{'0'}; };
+    if (digit(11) > 2 || digit(12) > 9 || digit(14) > 5 || digit(15) > 9) return {};
+    const unsigned hour = 10 * digit(11) + digit(12);
+    if (hour > 23) return {};
+    const std::int64_t second = lastDaySecond_ + std::int64_t{60 * (60 * hour + 10 * digit(14) + digit(15))};
+    at += kLength;
+    return second;
+  }
 
  private:
   std::optional<std::int64_t> scanDay(const char* at);

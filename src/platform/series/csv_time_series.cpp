@@ -12,6 +12,7 @@
 #include "common/calendar.h"
 #include "common/encoding.h"
 #include "common/files.h"
+#include "common/large_pages.h"
 #include "common/take_text.h"
 #include "common/text.h"
 #include "common/utf8.h"
@@ -23,6 +24,7 @@ namespace mirevo {
 namespace {
 
 constexpr std::ptrdiff_t kLongestLine = std::ptrdiff_t{1} << 26;
+constexpr std::size_t kRowsPerLook = 65536;  ///< at the clock
 constexpr std::size_t kMostItems = 1'000'000;
 constexpr std::size_t kMostDoubts = 10;  ///< of comments
 
@@ -199,14 +201,14 @@ bool CsvTimeSeries::readRows(std::size_t position) {
   // Estimates the number of rows from the length of the first; the shortest row is a date and an empty cell.
   constexpr std::size_t kShortestRow = 12;
   const std::size_t rowLength = std::max(kShortestRow, static_cast<std::size_t>(csv::endOfLine(line, end) - line) + 1);
-  times_.reserve((content_.size() - position) / rowLength + 1);
-  cells_.reserve(times_.capacity());
+  reserveToFill(times_, (content_.size() - position) / rowLength + 1);
+  reserveToFill(cells_, times_.capacity());
   csv::DateScanner dates;
   std::int64_t second = 0;
   for (std::size_t row = 0; line < end; ++row) {
     const char* const next = csv::endOfLine(line, end);
     if (next - line > kLongestLine) return failOfLength(line, next);
-    if (isOverAt(row)) return false;
+    if (row % kRowsPerLook == 0 && isOver()) return false;
     const char* const lineEnd = csv::trimReturn(line, next);
     if (!std::all_of(line, lineEnd, csv::isBlank) && !readRow(line, lineEnd, dates, second)) return false;
     line = next + 1;
@@ -216,7 +218,8 @@ bool CsvTimeSeries::readRows(std::size_t position) {
 
 bool CsvTimeSeries::readRow(const char* line, const char* lineEnd, csv::DateScanner& dates, std::int64_t& second) {
   const char* at = line;
-  const std::optional<std::int64_t> now = dates.scanCell(at, lineEnd);
+  std::optional<std::int64_t> now = dates.scanOnLastDay(at, lineEnd, separator_);
+  if (!now) now = dates.scanCell(at, lineEnd);
   if (!now || (at != lineEnd && *at != separator_)) {
     const char* const cellEnd = csv::endOfCell(line, lineEnd, separator_);
     return fail(line, "a valid time like 2001-01-31 12:30", quotedForMessage(csv::cellText(line, cellEnd)));
@@ -263,9 +266,8 @@ std::vector<std::string> CsvTimeSeries::doubts() const {
   return doubts;
 }
 
-bool CsvTimeSeries::isOverAt(std::size_t row) {
-  constexpr std::size_t kRowsPerLook = 65536;
-  if (!reading_ || row % kRowsPerLook != 0 || !reading_->watch.isOver()) return false;
+bool CsvTimeSeries::isOver() {
+  if (!reading_ || !reading_->watch.isOver()) return false;
   lastError_ = sourceName_ + ": " + reading_->watch.reason();
   return true;
 }
@@ -286,14 +288,14 @@ void CsvTimeSeries::moveToItem(int item) {
 template <typename Value>
 bool CsvTimeSeries::readCells(std::size_t place, std::vector<Value>& values) {
   moveToItem(static_cast<int>(place) + 1);
-  values.reserve(times_.size());
+  reserveToFill(values, times_.size());
   const char* const begin = content_.data();
   const char* const end = begin + content_.size();
   const auto endsCell = [&](const char* at) {
     return at == end || *at == separator_ || *at == '\n' || (*at == '\r' && (at + 1 == end || at[1] == '\n'));
   };
   for (std::size_t row = 0; row < cells_.size(); ++row) {
-    if (std::is_same_v<Value, float> && isOverAt(row)) {
+    if (std::is_same_v<Value, float> && row % kRowsPerLook == 0 && isOver()) {
       values.clear();
       return false;
     }

@@ -54,8 +54,8 @@ class CsvTimeSeries final : public StoredTimeSeries {
   bool readRows(std::size_t position);
   bool readRow(const char* line, const char* lineEnd, csv::DateScanner& dates, std::int64_t& second);
   void moveToItem(int item);
-  /// Whether the time is over, with lastError_ set then; looks at the clock once for many rows.
-  bool isOverAt(std::size_t row);
+  /// Whether the time is over, with lastError_ set then.
+  bool isOver();
   /// Stores "file:line:column: expected ..., found ..." for the position `at` in the content as the last error; returns
   /// false.
   bool fail(const char* at, std::string_view expected, std::string_view found);

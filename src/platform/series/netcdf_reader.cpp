@@ -10,6 +10,7 @@
 
 #include "common/calendar.h"
 #include "common/reading_watch.h"
+#include "platform/series/netcdf_functions.h"
 
 namespace mirevo {
 namespace {
@@ -157,6 +158,11 @@ class Exchange final {
   /// False, with the reason, when no good answer has come.
   bool ask(std::span<const int> items) {
     std::string why;
+    // Loaded here, so that a helper that is replaced has it at once, and of the version with which the run began.
+    if (netcdfFunctions(why) == nullptr) {
+      reason_ = fmt::format("{}: NetCDF files cannot be read: {}", path_, why);
+      return false;
+    }
     if (!helper_.isRunning() && !helper_.start(serveFiles, why)) {
       reason_ = fmt::format("{}: a process that reads it could not be started: {}", path_, why);
       return false;

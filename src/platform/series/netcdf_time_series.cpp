@@ -11,11 +11,15 @@
 #include "common/files.h"
 #include "common/text.h"
 #include "platform/series/netcdf_classic.h"
+#include "platform/series/netcdf_functions.h"
 #include "platform/series/netcdf_units.h"
 #include "platform/series/printed_units.h"
 
 namespace mirevo {
 namespace {
+
+/// Set by the first file that is opened.
+const NetcdfFunctions* library = nullptr;
 
 constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
 
@@ -31,14 +35,14 @@ std::optional<Variable> inquireVariable(int file, int variable) {
   char name[NC_MAX_NAME + 1] = {};
   int dimensionCount = 0;
   Variable result;
-  if (nc_inq_var(file, variable, name, &result.type, &dimensionCount, nullptr, nullptr) != NC_NOERR)
+  if (library->inq_var(file, variable, name, &result.type, &dimensionCount, nullptr, nullptr) != NC_NOERR)
     return std::nullopt;
   result.name = name;
   result.dimensions.resize(static_cast<std::size_t>(dimensionCount));
-  if (nc_inq_vardimid(file, variable, result.dimensions.data()) != NC_NOERR) return std::nullopt;
+  if (library->inq_vardimid(file, variable, result.dimensions.data()) != NC_NOERR) return std::nullopt;
   for (const int dimension : result.dimensions) {
     std::size_t length = 0;
-    if (nc_inq_dimlen(file, dimension, &length) != NC_NOERR) return std::nullopt;
+    if (library->inq_dimlen(file, dimension, &length) != NC_NOERR) return std::nullopt;
     result.lengths.push_back(length);
   }
   return result;
@@ -53,17 +57,17 @@ bool isNumeric(nc_type type) {
 std::string textAttribute(int file, int variable, const char* name) {
   nc_type type = NC_NAT;
   std::size_t length = 0;
-  if (nc_inq_att(file, variable, name, &type, &length) != NC_NOERR || length == 0) return {};
+  if (library->inq_att(file, variable, name, &type, &length) != NC_NOERR || length == 0) return {};
   if (type == NC_CHAR) {
     std::string text(length, '\0');
-    if (nc_get_att_text(file, variable, name, text.data()) != NC_NOERR) return {};
+    if (library->get_att_text(file, variable, name, text.data()) != NC_NOERR) return {};
     return text.substr(0, text.find('\0'));
   }
   if (type != NC_STRING) return {};
   std::vector<char*> texts(length, nullptr);
-  if (nc_get_att_string(file, variable, name, texts.data()) != NC_NOERR) return {};
+  if (library->get_att_string(file, variable, name, texts.data()) != NC_NOERR) return {};
   std::string text = texts.front() != nullptr ? texts.front() : "";
-  nc_free_string(length, texts.data());
+  library->free_string(length, texts.data());
   return text;
 }
 
@@ -76,9 +80,9 @@ struct Numbers {
 Numbers numbersAttribute(int file, int variable, const char* name) {
   Numbers numbers;
   std::size_t length = 0;
-  if (nc_inq_att(file, variable, name, &numbers.type, &length) != NC_NOERR || !isNumeric(numbers.type)) return {};
+  if (library->inq_att(file, variable, name, &numbers.type, &length) != NC_NOERR || !isNumeric(numbers.type)) return {};
   numbers.values.resize(length);
-  if (nc_get_att_double(file, variable, name, numbers.values.data()) != NC_NOERR) return {};
+  if (library->get_att_double(file, variable, name, numbers.values.data()) != NC_NOERR) return {};
   return numbers;
 }
 
@@ -208,7 +212,7 @@ NetcdfTimeSeries::~NetcdfTimeSeries() {
 }
 
 void NetcdfTimeSeries::close() {
-  if (file_ >= 0) nc_close(file_);
+  if (file_ >= 0) library->close(file_);
   file_ = -1;
   timeDimension_ = -1;
   times_.clear();
@@ -222,7 +226,7 @@ bool NetcdfTimeSeries::fail(const std::string& what) {
 }
 
 bool NetcdfTimeSeries::succeeded(int status, const std::string& what) {
-  return status == NC_NOERR || fail(what + ": " + nc_strerror(status));
+  return status == NC_NOERR || fail(what + ": " + library->strerror(status));
 }
 
 bool NetcdfTimeSeries::open(const std::string& fileName) {
@@ -231,8 +235,11 @@ bool NetcdfTimeSeries::open(const std::string& fileName) {
   fileName_ = fileName;
   if (const std::string fault = faultOfFile(fileName); !fault.empty()) return fail("opening: " + fault);
   if (const auto cutOff = findCutOff(fileName)) return fail(*cutOff);
+  std::string reason;
+  library = netcdfFunctions(reason);
+  if (library == nullptr) return fail("NetCDF files cannot be read: " + reason);
   int timeVariable = -1;
-  if (succeeded(nc_open(fileName.c_str(), NC_NOWRITE, &file_), "opening") && findTimeVariable(timeVariable) &&
+  if (succeeded(library->open(fileName.c_str(), NC_NOWRITE, &file_), "opening") && findTimeVariable(timeVariable) &&
       readTimes(timeVariable) && findItems(timeVariable)) {
     return true;
   }
@@ -242,14 +249,15 @@ bool NetcdfTimeSeries::open(const std::string& fileName) {
 
 bool NetcdfTimeSeries::findTimeVariable(int& timeVariable) {
   int variableCount = 0;
-  if (!succeeded(nc_inq_nvars(file_, &variableCount), "reading the variables")) return false;
+  if (!succeeded(library->inq_nvars(file_, &variableCount), "reading the variables")) return false;
   timeVariable = -1;
   for (int id = 0; id < variableCount; ++id) {
     const std::optional<Variable> variable = inquireVariable(file_, id);
     if (!variable || variable->dimensions.size() != 1 || !isNumeric(variable->type)) continue;
     if (toLowerAscii(textAttribute(file_, id, "units")).find(" since ") == std::string::npos) continue;
     char dimensionName[NC_MAX_NAME + 1] = {};
-    if (!succeeded(nc_inq_dimname(file_, variable->dimensions[0], dimensionName), "reading a dimension")) return false;
+    if (!succeeded(library->inq_dimname(file_, variable->dimensions[0], dimensionName), "reading a dimension"))
+      return false;
     const bool isCoordinate = variable->name == dimensionName;
     if (timeVariable >= 0 && !isCoordinate) continue;
     timeVariable = id;
@@ -273,7 +281,7 @@ bool NetcdfTimeSeries::readTimes(int timeVariable) {
                                                         textAttribute(file_, timeVariable, "calendar"), reason);
   if (!units) return fail(where + ": " + reason);
   std::vector<double> stored(count);
-  if (!succeeded(nc_get_var_double(file_, timeVariable, stored.data()), "reading " + where)) return false;
+  if (!succeeded(library->get_var_double(file_, timeVariable, stored.data()), "reading " + where)) return false;
   const Unpacking unpack(file_, timeVariable, variable->type);
   const auto earliest = static_cast<double>(secondNumber({0, 1, 1}));
   const auto latest = static_cast<double>(secondNumber({9999, 12, 31}));
@@ -305,7 +313,7 @@ bool NetcdfTimeSeries::readTimes(int timeVariable) {
 
 bool NetcdfTimeSeries::findItems(int timeVariable) {
   int variableCount = 0;
-  if (!succeeded(nc_inq_nvars(file_, &variableCount), "reading the variables")) return false;
+  if (!succeeded(library->inq_nvars(file_, &variableCount), "reading the variables")) return false;
   const std::string bounds = textAttribute(file_, timeVariable, "bounds");
   for (int id = 0; id < variableCount; ++id) {
     const std::optional<Variable> variable = inquireVariable(file_, id);
@@ -351,13 +359,13 @@ std::optional<std::vector<double>> NetcdfTimeSeries::readValues(std::size_t plac
   const Place& at = places_[place];
   const std::string where = "variable \"" + items_[place].name + "\"";
   nc_type type = NC_NAT;
-  if (!succeeded(nc_inq_vartype(file_, at.variable, &type), "reading " + where)) return std::nullopt;
+  if (!succeeded(library->inq_vartype(file_, at.variable, &type), "reading " + where)) return std::nullopt;
   std::vector<std::size_t> start(static_cast<std::size_t>(at.dimensionCount), 0);
   std::vector<std::size_t> count(start.size(), 1);
   count[static_cast<std::size_t>(at.timePosition)] = times_.size();
   if (at.stationPosition >= 0) start[static_cast<std::size_t>(at.stationPosition)] = at.station;
   std::vector<double> values(times_.size());
-  if (!succeeded(nc_get_vara_double(file_, at.variable, start.data(), count.data(), values.data()),
+  if (!succeeded(library->get_vara_double(file_, at.variable, start.data(), count.data(), values.data()),
                  "reading " + where)) {
     return std::nullopt;
   }
@@ -389,7 +397,7 @@ std::vector<double> NetcdfTimeSeries::readExactItem(std::size_t place) {
 NetcdfUnit NetcdfTimeSeries::unitOf(std::size_t place) const {
   const int variable = places_[place].variable;
   nc_type type = NC_NAT;
-  if (nc_inq_vartype(file_, variable, &type) != NC_NOERR || type == NC_DOUBLE) return {};
+  if (library->inq_vartype(file_, variable, &type) != NC_NOERR || type == NC_DOUBLE) return {};
   if (type == NC_FLOAT) return {NetcdfUnit::Kind::single};
   return {NetcdfUnit::Kind::scaled, std::abs(numberAttribute(file_, variable, "scale_factor").value_or(1.0))};
 }

@@ -135,6 +135,11 @@ std::optional<float> valueAt(const TimeSeriesObject& series, int item, double da
   return interpolate(series.times(), series.values(item), series.deleteValue(), days, largestGap, hint);
 }
 
+std::optional<float> valueAt(std::span<const double> times, std::span<const float> values,
+                             std::optional<float> deleteValue, double days, std::size_t& hint, double largestGap) {
+  return interpolate(times, values, deleteValue, days, largestGap, hint);
+}
+
 std::optional<double> exactValueAt(std::span<const double> times, std::span<const double> values, double days,
                                    std::size_t& hint, double largestGap) {
   return interpolate(times, values, std::nullopt, days, largestGap, hint);

@@ -92,6 +92,9 @@ bool isMissing(Value value, std::optional<float> deleteValue) {
 std::optional<float> valueAt(const TimeSeriesObject& series, int item, double days, std::size_t& hint,
                              double largestGap = kAnyGap);
 std::optional<float> valueAt(const TimeSeriesObject& series, int item, double days);
+/// The same for a series of `times` and `values`.
+std::optional<float> valueAt(std::span<const double> times, std::span<const float> values,
+                             std::optional<float> deleteValue, double days, std::size_t& hint, double largestGap);
 
 /// The same in 64 bits for a series of `times` and `values`, in which NaN is missing.
 std::optional<double> exactValueAt(std::span<const double> times, std::span<const double> values, double days,

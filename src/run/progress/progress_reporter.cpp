@@ -5,6 +5,7 @@
 #include <cstring>
 #include <fcntl.h>
 #include <filesystem>
+#include <sys/stat.h>
 #include <system_error>
 #include <unistd.h>
 #include <utility>
@@ -23,7 +24,8 @@ namespace {
 
 constexpr int kNowhere = -1;
 constexpr int kStandardOutput = 0;
-constexpr std::size_t kSpeedWindow = 100;  ///< evaluations
+constexpr double kKillFileSeconds = 0.001;  ///< between two looks: it is asked for several times for each model run
+constexpr std::size_t kSpeedWindow = 100;   ///< evaluations
 /// Longest wait for a pipe or terminal to accept a record. After that there is no waiting until it accepts one again,
 /// so that a reader that has stopped reading does not slow down the run.
 constexpr int kPatienceMilliseconds = 1000;
@@ -54,6 +56,7 @@ bool ProgressReporter::closeMessageFile() {
 
 std::string ProgressReporter::progressInit(std::string_view runFileName, std::string_view destination) {
   baseName_ = baseNameOf(runFileName);
+  isOnDisk_ = false;
   std::string problems;
   const std::string killFile = runFilePath(baseName_, run_files::kKill);
   if (::unlink(killFile.c_str()) != 0 && errno != ENOENT) {
@@ -70,6 +73,8 @@ std::string ProgressReporter::progressInit(std::string_view runFileName, std::st
     messageUnit_ = ::open(messageFile().c_str(),
                           O_WRONLY | O_CREAT | O_TRUNC | O_APPEND | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK, 0666);
     if (messageUnit_ >= 0) {
+      struct stat status {};
+      isOnDisk_ = ::fstat(messageUnit_, &status) == 0 && S_ISREG(status.st_mode);
       signalState.messageFileDescriptor = messageUnit_;
     } else {
       if (!problems.empty()) problems += '\n';
@@ -79,7 +84,7 @@ std::string ProgressReporter::progressInit(std::string_view runFileName, std::st
   return problems;
 }
 
-void ProgressReporter::writeRecord(std::string_view kind, std::string_view text) {
+void ProgressReporter::addRecord(std::string_view kind, std::string_view text) {
   if (messageUnit_ < 0 && !listener_) return;
   std::string record = std::string(kind) + withValidUtf8(text);
   std::replace_if(
@@ -91,14 +96,26 @@ void ProgressReporter::writeRecord(std::string_view kind, std::string_view text)
     if (kind != progress::kMessage) return;
     record.replace(0, kind.size(), " ");  // list-directed output begins with a blank
   }
-  if (isLineUnfinished_) record.insert(record.begin(), '\n');
+  added_ += record;
+}
+
+void ProgressReporter::writeAdded() {
+  std::string records = std::exchange(added_, {});
+  if (messageUnit_ < 0 || records.empty()) return;
+  if (isLineUnfinished_) records.insert(records.begin(), '\n');
   const int descriptor = messageUnit_ == kStandardOutput ? STDOUT_FILENO : messageUnit_;
+  const int patience = isOnDisk_ ? kAsLongAsItTakes : isReaderBusy_ ? 0 : kPatienceMilliseconds;
   // One write(2), so that a viewer never sees half a record in a file on disk.
-  const OutputResult result = writeWhole(descriptor, record, isReaderBusy_ ? 0 : kPatienceMilliseconds);
+  const OutputResult result = writeWhole(descriptor, records, patience);
   isReaderBusy_ = result.error == EAGAIN;  // the record is lost
-  if (result.taken > 0) isLineUnfinished_ = result.taken < record.size();
+  if (result.taken > 0) isLineUnfinished_ = result.taken < records.size();
   // A full disk or a closed pipe ends the reporting and not the run.
   if (result.error != 0 && !isReaderBusy_) giveUp(result.error);
+}
+
+void ProgressReporter::writeRecord(std::string_view kind, std::string_view text) {
+  addRecord(kind, text);
+  writeAdded();
 }
 
 /// A full disk or a closed pipe ends the reporting and not the run.
@@ -142,23 +159,25 @@ void ProgressReporter::progressStep() {
   if (seconds > 0.0) {
     const double perSecond = static_cast<double>(times_.size() - 1) / seconds;
     const int left = std::max(0, plannedEvaluations_ - completedEvaluations_);
-    writeRecord(progress::kSpeed, fmt::format("{:.6g}", perSecond));
-    writeRecord(progress::kTimeLeft, fmt::format("{:.0f}", left / perSecond));
+    addRecord(progress::kSpeed, fmt::format("{:.6g}", perSecond));
+    addRecord(progress::kTimeLeft, fmt::format("{:.0f}", left / perSecond));
   }
-  writePercentage();
+  addPercentage();
+  writeAdded();
   isCancelled();
 }
 
-void ProgressReporter::writePercentage() {
+void ProgressReporter::addPercentage() {
   if (plannedEvaluations_ <= 0) return;
   const double percent = std::min(100.0, 100.0 * completedEvaluations_ / plannedEvaluations_);
-  writeRecord(progress::kPercentage, fmt::format("{:.1f}", percent));
+  addRecord(progress::kPercentage, fmt::format("{:.1f}", percent));
 }
 
 void ProgressReporter::progressReplayed(int number, bool ok) {
   ++completedEvaluations_;
-  writeMessage(progress::replayedMessage(number, ok));
-  writePercentage();  // the next evaluation may take hours
+  addRecord(progress::kMessage, progress::replayedMessage(number, ok));
+  addPercentage();  // the next evaluation may take hours
+  writeAdded();
   times_.assign(1, clock_());
 }
 
@@ -176,7 +195,10 @@ void ProgressReporter::progressEnd(std::string_view ending) {
 
 bool ProgressReporter::isCancelled() {
   if (listener_) listener_({});
-  if (!cancelled_) cancelled_ = ::access(runFilePath(baseName_, run_files::kKill).c_str(), F_OK) == 0;
+  const double now = clock_();
+  if (cancelled_ || now < nextLook_) return cancelled_;
+  cancelled_ = ::access(runFilePath(baseName_, run_files::kKill).c_str(), F_OK) == 0;
+  nextLook_ = now + kKillFileSeconds;
   return cancelled_;
 }
 

@@ -2,6 +2,7 @@
 
 #include <deque>
 #include <functional>
+#include <limits>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -50,11 +51,15 @@ class ProgressReporter final {
   /// when all is well; the run goes on in any case.
   std::string takeProblem() { return std::exchange(problem_, {}); }
 
-  /// Whether the kill file has appeared. Once true it stays true, and the disk is not checked again.
+  /// Whether the kill file has appeared; looks at most once a millisecond. Once true it stays true, and the disk is not
+  /// checked again.
   bool isCancelled();
 
  private:
-  void writePercentage();
+  void addPercentage();
+  /// Adds a record to those that the next writeAdded() writes.
+  void addRecord(std::string_view kind, std::string_view text);
+  void writeAdded();
   void writeRecord(std::string_view kind, std::string_view text);
   /// False, with errno set, when what was written may not be in the file.
   bool closeMessageFile();
@@ -65,10 +70,13 @@ class ProgressReporter final {
   std::function<void(std::string_view)> listener_;
   std::string baseName_;
   std::string problem_;
+  std::string added_;
   int messageUnit_ = -1;           ///< < 0 nowhere, 0 standard output, > 0 the message file's descriptor
+  bool isOnDisk_ = false;          ///< the message file is no pipe
   bool isReaderBusy_ = false;      ///< the reader has not accepted the latest record
   bool isLineUnfinished_ = false;  ///< the reader has accepted only part of a record
   bool cancelled_ = false;
+  double nextLook_ = -std::numeric_limits<double>::infinity();  ///< at the kill file, by clock_
   int plannedEvaluations_ = 0;
   int completedEvaluations_ = 0;
   /// The start time and the times at which the latest evaluations were completed, oldest first. The speed is computed

@@ -4,6 +4,7 @@
 #include <cerrno>
 #include <cstring>
 #include <fcntl.h>
+#include <sys/stat.h>
 #include <unistd.h>
 #include <utility>
 
@@ -85,10 +86,12 @@ void RunLog::write(std::string_view record) {
     pending_ += record;
     return;
   }
-  putBackIfRemoved(descriptor_, path_);  // if that fails, the log and the run go on all the same
+  struct stat status {};
+  const bool isKnown = ::fstat(descriptor_, &status) == 0;
+  if (isKnown) putBackIfRemoved(descriptor_, path_, status);  // if that fails, the log and the run go on all the same
   // What a model prints and what files are called may be in any encoding.
   const std::string text = withValidUtf8(record);
-  const bool isEmpty = ::lseek(descriptor_, 0, SEEK_END) == 0;
+  const bool isEmpty = isKnown && status.st_size == 0;
   const int error = writeWhole(descriptor_, isEmpty ? head_ + text : text).error;
   if (error != 0 && writeError_.empty()) writeError_ = std::strerror(error);
   if (head_.empty()) head_ = text;

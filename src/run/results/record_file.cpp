@@ -92,14 +92,16 @@ bool RecordFile::tryAppend(std::string_view record, std::string& reason) {
     return false;
   }
   const EndingSignalsHeld held;  // so that a signal's closing line follows a whole record
-  if (!putBackIfRemoved(descriptor_, path_)) {
+  struct stat status {};
+  const bool isKnown = ::fstat(descriptor_, &status) == 0;
+  if (isKnown && !putBackIfRemoved(descriptor_, path_, status)) {
     reason = errno == EEXIST ? replacedText()
                              : std::string("it was removed and cannot be put back: ") + std::strerror(errno);
     failed_ = true;
     return false;
   }
   const std::int64_t before = size_;
-  if (!takeUpSize(reason)) {
+  if (isKnown && !takeUpSize(status, reason)) {
     failed_ = true;
     return false;
   }
@@ -118,9 +120,8 @@ bool RecordFile::tryAppend(std::string_view record, std::string& reason) {
   return true;
 }
 
-bool RecordFile::takeUpSize(std::string& reason) {
-  struct stat status {};
-  if (::fstat(descriptor_, &status) != 0 || !S_ISREG(status.st_mode)) return true;
+bool RecordFile::takeUpSize(struct stat status, std::string& reason) {
+  if (!S_ISREG(status.st_mode)) return true;
   // A network file system may show an earlier size for a while, until the file is opened anew. Afterwards any size but
   // the old one is of a program that has written the file again.
   constexpr int kMoreLooks = 10;
@@ -189,7 +190,9 @@ void RecordFile::close() {
 
 bool RecordFile::tryClose(std::string& reason) {
   if (descriptor_ < 0) return true;
-  const bool isWhole = failed_ || takeUpSize(reason);  // a failure has been told
+  struct stat status {};
+  const bool isKnown = ::fstat(descriptor_, &status) == 0;
+  const bool isWhole = failed_ || !isKnown || takeUpSize(status, reason);  // a failure has been told
   const int descriptor = std::exchange(descriptor_, -1);
   // What the system has taken may still fail on its way to the disk, and only this call tells of it.
   const int lost = ::fsync(descriptor) == 0 || errno == EINVAL || errno == EINTR ? 0 : errno;

@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <string>
 #include <string_view>
+#include <sys/stat.h>
 #include <vector>
 
 namespace mirevo {
@@ -57,8 +58,9 @@ class RecordFile final {
   std::int64_t size() const { return size_; }
 
  private:
-  /// Takes up what other programs have appended. False, with the reason, if one of them has shortened the file.
-  bool takeUpSize(std::string& reason);
+  /// Takes up what other programs have appended, by what fstat() has just told of the file. False, with the reason, if
+  /// one of them has shortened it.
+  bool takeUpSize(struct stat status, std::string& reason);
   bool endsLine() const;
   void openWith(const std::string& path, int flags);
 

@@ -9,6 +9,7 @@
 #include <fmt/format.h>
 
 #include "algorithms/analyses/covariance.h"
+#include "algorithms/numbers/lapack_functions.h"
 #include "common/calendar.h"
 #include "evaluation/stored_results.h"
 #include "measures/dates.h"
@@ -224,6 +225,7 @@ std::string SensitivityTask::description() const {
 }
 
 TaskOutcome SensitivityTask::outcomeOf(const TaskContext& context, Evaluator& evaluator) const {
+  if (settings.calculatesCovariance) lapack();  // missed before the model runs, if ever
   TaskOutcome outcome{std::string(kEndOfTask)};
   LocalSensitivity sensitivity = localSensitivity(settings, context.space, evaluator, context.fields,
                                                   context.feasibility, context.objectives, context.measures);
