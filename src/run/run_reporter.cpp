@@ -133,7 +133,9 @@ void RunReporter::evaluationReplayed(std::span<const double> set, const Evaluati
   if (lacksPairs) pairs_->add(result.number, result.pairs);
   const std::vector<double> values = ToModelScale(space_, set);
   if (result.pairs.empty()) {
-    replayedWithoutPairs_.insert(result.number);
+    const auto number = static_cast<std::size_t>(result.number);
+    if (replayedWithoutPairs_.size() <= number) replayedWithoutPairs_.resize(number + 1);
+    replayedWithoutPairs_[number] = true;
   } else {
     lastWithPairs_ = {result.number, values};
     if (searchHasEnded_ && result.ok()) finalRun_ = result.number;
@@ -218,8 +220,10 @@ std::string RunReporter::unkeptWarning() const {
 std::vector<std::string> RunReporter::differencesOfBest() const {
   if (!best()) return {};
   const int number = best()->number;
+  const auto place = static_cast<std::size_t>(number);
+  const bool isReplayedWithoutPairs = place < replayedWithoutPairs_.size() && replayedWithoutPairs_[place];
   // The rows of its pairs may have been lost, so that those of the final model run, of the same set, tell.
-  const bool isKnownOfFinalRun = replayedWithoutPairs_.contains(number) && lastWithPairs_.number != number &&
+  const bool isKnownOfFinalRun = isReplayedWithoutPairs && lastWithPairs_.number != number &&
                                  lastWithPairs_.parameterValues == best()->parameterValues;
   const int judged = isKnownOfFinalRun ? lastWithPairs_.number : number;
   std::vector<RunDifference> ofBest;

@@ -140,7 +140,7 @@ class RunReporter final : public EvaluationObserver {
   int firstSuccess_ = 0;  ///< with which others are compared
   /// By kind, evaluation and measure.
   std::map<std::tuple<RunDifference::Kind, int, std::size_t>, RunDifference> differences_;
-  std::set<int> replayedWithoutPairs_;  ///< as many as the first successful run, or lost ones
+  std::vector<bool> replayedWithoutPairs_;  ///< by number; as many as the first successful run, or lost ones
   /// The last evaluation of which it is known whether it differs.
   struct {
     int number = 0;

@@ -5,6 +5,7 @@
 #include <cstring>
 #include <fcntl.h>
 #include <filesystem>
+#include <sys/stat.h>
 #include <system_error>
 #include <unistd.h>
 #include <utility>
@@ -27,6 +28,9 @@ constexpr std::size_t kSpeedWindow = 100;  ///< evaluations
 /// Longest wait for a pipe or terminal to accept a record. After that there is no waiting until it accepts one again,
 /// so that a reader that has stopped reading does not slow down the run.
 constexpr int kPatienceMilliseconds = 1000;
+/// Of records that are written together: bytes, which a pipe's reader gets in one piece, and seconds.
+constexpr std::size_t kMostWaiting = 3500;
+constexpr double kLongestWait = 0.1;
 
 std::string baseNameOf(std::string_view runFileName) {
   for (const std::string_view ending : {run_files::kLog.extension, std::string_view(".inp")}) {
@@ -39,13 +43,15 @@ std::string baseNameOf(std::string_view runFileName) {
 
 }  // namespace
 
-ProgressReporter::ProgressReporter(Clock clock) : clock_(std::move(clock)) {}
+ProgressReporter::ProgressReporter(Clock clock, std::size_t mostBytes)
+    : clock_(std::move(clock)), mostBytes_(mostBytes) {}
 
 ProgressReporter::~ProgressReporter() {
   closeMessageFile();
 }
 
 bool ProgressReporter::closeMessageFile() {
+  writeWaiting();
   const int descriptor = std::exchange(messageUnit_, kNowhere);
   if (descriptor <= kStandardOutput) return true;
   signalState.messageFileDescriptor = -1;
@@ -71,6 +77,8 @@ std::string ProgressReporter::progressInit(std::string_view runFileName, std::st
                           O_WRONLY | O_CREAT | O_TRUNC | O_APPEND | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK, 0666);
     if (messageUnit_ >= 0) {
       signalState.messageFileDescriptor = messageUnit_;
+      struct stat status {};
+      isFile_ = ::fstat(messageUnit_, &status) == 0 && S_ISREG(status.st_mode);
     } else {
       if (!problems.empty()) problems += '\n';
       problems += fmt::format("Unable to open TqQmon2 message file: {}: {}", messageFile(), std::strerror(errno));
@@ -91,14 +99,46 @@ void ProgressReporter::writeRecord(std::string_view kind, std::string_view text)
     if (kind != progress::kMessage) return;
     record.replace(0, kind.size(), " ");  // list-directed output begins with a blank
   }
+  if (isFile_) summary_.take(kind, std::string_view(record).substr(kind.size(), record.size() - kind.size() - 1));
+  if (isFile_ && isReplaying_) {
+    if (waiting_.empty()) waitingSince_ = clock_();
+    waiting_ += record;
+    return;
+  }
+  writeWaiting();
+  write(record);
+}
+
+/// Thousands of results may be taken from an earlier run in a second, and a write for each would take longer than that.
+void ProgressReporter::writeWaiting() {
+  if (!waiting_.empty() && messageUnit_ >= 0) write(std::exchange(waiting_, {}));
+}
+
+void ProgressReporter::write(const std::string& records) {
+  std::string record = records;
   if (isLineUnfinished_) record.insert(record.begin(), '\n');
   const int descriptor = messageUnit_ == kStandardOutput ? STDOUT_FILENO : messageUnit_;
   // One write(2), so that a viewer never sees half a record in a file on disk.
   const OutputResult result = writeWhole(descriptor, record, isReaderBusy_ ? 0 : kPatienceMilliseconds);
   isReaderBusy_ = result.error == EAGAIN;  // the record is lost
   if (result.taken > 0) isLineUnfinished_ = result.taken < record.size();
+  bytes_ += result.taken;
   // A full disk or a closed pipe ends the reporting and not the run.
-  if (result.error != 0 && !isReaderBusy_) giveUp(result.error);
+  if (result.error != 0 && !isReaderBusy_) return giveUp(result.error);
+  if (isFile_ && bytes_ > mostBytes_) beginAnew();
+}
+
+/// In place, so that a reader that has the file open goes on, too.
+void ProgressReporter::beginAnew() {
+  const EndingSignalsHeld held;  // whose records come last
+  if (::ftruncate(messageUnit_, 0) != 0) {
+    isFile_ = false;  // it is none that can be begun anew
+    return;
+  }
+  bytes_ = 0;
+  isLineUnfinished_ = false;
+  mostBytes_ = std::max(mostBytes_, 4 * summary_.records().size());
+  write(summary_.records());
 }
 
 /// A full disk or a closed pipe ends the reporting and not the run.
@@ -152,14 +192,20 @@ void ProgressReporter::progressStep() {
 void ProgressReporter::writePercentage() {
   if (plannedEvaluations_ <= 0) return;
   const double percent = std::min(100.0, 100.0 * completedEvaluations_ / plannedEvaluations_);
-  writeRecord(progress::kPercentage, fmt::format("{:.1f}", percent));
+  std::string text = fmt::format("{:.1f}", percent);
+  if (isReplaying_ && text == percentage_) return;
+  percentage_ = std::move(text);
+  writeRecord(progress::kPercentage, percentage_);
 }
 
 void ProgressReporter::progressReplayed(int number, bool ok) {
   ++completedEvaluations_;
+  isReplaying_ = true;
   writeMessage(progress::replayedMessage(number, ok));
-  writePercentage();  // the next evaluation may take hours
+  writePercentage();
+  isReplaying_ = false;
   times_.assign(1, clock_());
+  if (waiting_.size() > kMostWaiting || times_.front() - waitingSince_ > kLongestWait) writeWaiting();
 }
 
 void ProgressReporter::progressBest(int number, double aggregate, std::string_view foundAt) {

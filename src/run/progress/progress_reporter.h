@@ -1,10 +1,13 @@
 #pragma once
 
+#include <cstddef>
 #include <deque>
 #include <functional>
 #include <string>
 #include <string_view>
 #include <utility>
+
+#include "run/progress/record_summary.h"
 
 namespace mirevo {
 
@@ -14,8 +17,10 @@ class ProgressReporter final {
  public:
   /// Seconds from an arbitrary origin, never decreasing.
   using Clock = std::function<double()>;
+  static constexpr std::size_t kMostBytes = 16'000'000;
 
-  explicit ProgressReporter(Clock clock);
+  /// `mostBytes`: a message file that has become longer is begun anew, with what its records say in short.
+  explicit ProgressReporter(Clock clock, std::size_t mostBytes = kMostBytes);
   ~ProgressReporter();
   ProgressReporter(const ProgressReporter&) = delete;
   ProgressReporter& operator=(const ProgressReporter&) = delete;
@@ -56,6 +61,9 @@ class ProgressReporter final {
  private:
   void writePercentage();
   void writeRecord(std::string_view kind, std::string_view text);
+  void write(const std::string& records);
+  void writeWaiting();
+  void beginAnew();
   /// False, with errno set, when what was written may not be in the file.
   bool closeMessageFile();
   void giveUp(int error);
@@ -65,6 +73,14 @@ class ProgressReporter final {
   std::function<void(std::string_view)> listener_;
   std::string baseName_;
   std::string problem_;
+  std::size_t mostBytes_;
+  std::size_t bytes_ = 0;     ///< of the message file
+  bool isFile_ = false;       ///< the messages go to a file on disk
+  std::string waiting_;       ///< records on evaluations of an earlier run that are written together
+  bool isReplaying_ = false;  ///< the records that are being written are such
+  double waitingSince_ = 0.0;
+  std::string percentage_;  ///< that was written last
+  RecordSummary summary_;
   int messageUnit_ = -1;           ///< < 0 nowhere, 0 standard output, > 0 the message file's descriptor
   bool isReaderBusy_ = false;      ///< the reader has not accepted the latest record
   bool isLineUnfinished_ = false;  ///< the reader has accepted only part of a record

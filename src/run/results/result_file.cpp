@@ -1,8 +1,10 @@
 #include "run/results/result_file.h"
 
 #include <algorithm>
+#include <filesystem>
 #include <iterator>
 #include <optional>
+#include <system_error>
 #include <utility>
 
 #include <fmt/core.h>
@@ -32,7 +34,7 @@ std::string commentLines(std::span<const std::string> texts) {
 }  // namespace
 
 void ResultFile::open(const std::string& path, std::span<const std::string> headLines, const ResultColumns& columns,
-                      std::span<const ResultRow> earlierRows) {
+                      const ResultRows& earlierRows) {
   rows_.clear();
   earlierAggregates_.clear();
   aggregates_.clear();
@@ -45,33 +47,42 @@ void ResultFile::open(const std::string& path, std::span<const std::string> head
     file_.append(content);
     return;
   }
-  std::vector<RowChecksum> checksums;
+  std::error_code failed;
+  const std::uintmax_t size = std::filesystem::file_size(path, failed);
+  if (!failed) content.reserve(content.size() + size);  // about as long as that of the earlier run
+  rows_.reserve(earlierRows.size());
+  earlierAggregates_.reserve(earlierRows.size());
   for (const ResultRow& row : earlierRows) {
     const std::string line = resultRowText(row);
-    rows_.push_back({row.number, std::ssize(content), std::ssize(line) + 1, checksumOf(line)});
-    checksums.push_back({row.number, rows_.back().checksum});
-    earlierAggregates_[row.number] = row.aggregate;
-    content += line + '\n';
+    addPlace(row.number, std::ssize(content), line);
+    earlierAggregates_.emplace_back(row.number, row.aggregate);
+    content += line;
+    content += '\n';
   }
+  std::sort(earlierAggregates_.begin(), earlierAggregates_.end());
+  const std::vector<RowChecksum> checksums = checksumsOfRows();
   checksums_.complete(checksums);
   std::string reason;
   if (!replaceFile(path, content, reason)) fatalError("Error: Unable to write to " + path, reason);
+  content = {};
   checksums_.open(checksums);  // only now those of rows that are not taken up are superfluous
   file_.openToContinue(path);
 }
 
 void ResultFile::addRow(const ResultRow& row) {
   const std::string line = resultRowText(row);
-  const std::uint64_t checksum = checksumOf(line);
-  checksums_.add({row.number, checksum});  // before the row, which would be taken for damaged without it
-  if (!file_.append(line + '\n')) return;
-  const std::int64_t length = std::ssize(line) + 1;
-  rows_.push_back({row.number, file_.size() - length, length, checksum});
+  checksums_.add({row.number, checksumOf(line)});  // before the row, which would be taken for damaged without it
+  if (file_.append(line + '\n')) addPlace(row.number, file_.size() - std::ssize(line) - 1, line);
+}
+
+void ResultFile::addPlace(int number, std::int64_t offset, std::string_view line) {
+  rows_.push_back({offset, checksumOf(line), number, static_cast<std::uint32_t>(line.size() + 1)});
 }
 
 void ResultFile::replaceAggregate(int number, double aggregate) {
-  const auto earlier = earlierAggregates_.find(number);
-  if (earlier != earlierAggregates_.end() && earlier->second == aggregate) {
+  const auto earlier = std::lower_bound(earlierAggregates_.begin(), earlierAggregates_.end(), number,
+                                        [](const auto& entry, int wanted) { return entry.first < wanted; });
+  if (earlier != earlierAggregates_.end() && earlier->first == number && earlier->second == aggregate) {
     aggregates_.erase(number);
   } else {
     aggregates_[number] = aggregate;
@@ -108,7 +119,7 @@ bool ResultFile::hasRowsAsWritten(std::string_view content, std::string& reason)
   for (const Place& place : rows_) {
     const std::string_view line = content.substr(std::min(content.size(), static_cast<std::size_t>(place.offset)),
                                                  static_cast<std::size_t>(place.length));
-    if (std::ssize(line) == place.length && line.back() == '\n' &&
+    if (line.size() == place.length && line.back() == '\n' &&
         checksumOf(line.substr(0, line.size() - 1)) == place.checksum) {
       continue;
     }

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <optional>
 #include <span>
 #include <string>
@@ -30,7 +31,8 @@ struct ResultRow {
   std::vector<double> objectives;
   double aggregate = kFailedRunValue;
   std::vector<double> validation = {};
-  std::size_t line = 0;  ///< of a row that was read: the line of its file, from 1
+  std::size_t line = 0;            ///< of a row that was read: the line of its file, from 1
+  std::uint64_t lineChecksum = 0;  ///< likewise: checksumOf() the line
 };
 
 /// The columns for a setup.
@@ -52,5 +54,7 @@ bool isResultHeader(std::string_view line);
 bool hasColumns(std::string_view header, const ResultColumns& columns);
 /// The row in a line below a header row with these columns; empty for a line that is not a row.
 std::optional<ResultRow> readResultRow(std::string_view line, const ResultColumns& columns);
+/// The same into `row`, whose memory is used again; false for a line that is not a row.
+bool readResultRow(std::string_view line, const ResultColumns& columns, ResultRow& row);
 
 }  // namespace mirevo
