@@ -10,6 +10,7 @@
 
 #include <fmt/format.h>
 
+#include "analyses.h"
 #include "common/fatal_error.h"
 #include "large_result.h"
 #include "setups.h"
@@ -35,12 +36,46 @@ void uncertainty(const std::string& folder) {
   measureProgram("uncertainty of 10,000 parameters, 100 runs", setup);
 }
 
+/// 1,000 measures: 20 selections of the observations of each of 50 series of ten years of hourly values.
+void series(const std::string& folder) {
+  constexpr int kSeries = 50;
+  constexpr int kSelections = 20;
+  std::string measures = itemCount(kSeries * kSelections);
+  for (int i = 0; i < kSeries * kSelections; ++i) {
+    const std::string item = fmt::format("Item_No = {}\n", i % kSeries + 1);
+    measures += section(fmt::format("MEASURE_{}", i + 1),
+                        {fmt::format("Name = 'm{}'\nStatistic_Type = 1\nFunction_Name = 'all'\n", i + 1),
+                         fmt::format("Lowest_Observed = 0.0{:02}\n", i / kSeries + 1),
+                         section("SIMULATION_FILE", {"File_Name = 'base/simulated.csv'\n", item}),
+                         section("OBSERVATION_FILE", {"File_Name = 'observed.csv'\n", item})});
+  }
+  const std::string setup = writeSetup(folder, {.simulation = "Report = 0\n",
+                                                .measures = measures,
+                                                .task = ddsSections(4),
+                                                .model = "cat input.csv > simulated.csv\n"});
+  for (const std::string file : {"/base/input.csv", "/base/simulated.csv", "/observed.csv"}) {
+    writeHourlySeries(folder + file, kSeries);
+  }
+  measureProgram("1,000 measures over 50 series of 87,600 rows, 5 runs, Report = 0", setup);
+}
+
+void surrogate(const std::string& /*folder*/) {
+  measureQuadraticSurrogate();
+}
+void covariance(const std::string& /*folder*/) {
+  measureCovariance();
+}
+
 struct Figure {
   std::string_view name;
   void (*measure)(const std::string& folder);
 };
 
-constexpr Figure kFigures[] = {{"restart", restart}, {"uncertainty", uncertainty}};
+constexpr Figure kFigures[] = {{"restart", restart},
+                               {"uncertainty", uncertainty},
+                               {"series", series},
+                               {"surrogate", surrogate},
+                               {"covariance", covariance}};
 
 }  // namespace
 

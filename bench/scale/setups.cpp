@@ -93,6 +93,22 @@ std::string writeSetup(const std::string& folder, const ScaleSetup& setup) {
   return path;
 }
 
+void writeHourlySeries(const std::string& path, int series) {
+  constexpr int kRows = 87'600;
+  std::ofstream file(path);
+  file << "time";
+  for (int i = 1; i <= series; ++i) file << ",s" << i;
+  const auto start = std::chrono::sys_days(std::chrono::January / 1 / 2001);
+  for (int row = 0; row < kRows; ++row) {
+    const std::chrono::year_month_day day = start + std::chrono::days(row / 24);
+    std::string line = fmt::format("\n{:04}-{:02}-{:02} {:02}:00", static_cast<int>(day.year()),
+                                   static_cast<unsigned>(day.month()), static_cast<unsigned>(day.day()), row % 24);
+    for (int i = 0; i < series; ++i) line += fmt::format(",{}.{}", (row + 7 * i) % 97, row % 9 + 1);
+    file << line;
+  }
+  file << '\n';
+}
+
 std::string ddsSections(int budget) {
   return section("OPTIMISATION_ALGORITHM",
                  {"Algorithm_Type = 2\nUse_Surrogate_Model = 0\n",

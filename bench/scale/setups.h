@@ -25,6 +25,9 @@ std::string itemCount(int count);
 /// Writes the model into `folder`/base and the setup into `folder`/scale.kdx, whose path it returns.
 std::string writeSetup(const std::string& folder, const ScaleSetup& setup);
 
+/// A CSV file of 87,600 hourly values from 2001 on.
+void writeHourlySeries(const std::string& path, int series);
+
 /// A search by DDS with this budget.
 std::string ddsSections(int budget);
 /// An uncertainty analysis of so many sets.
