@@ -28,6 +28,7 @@ struct ModelDescription {
   std::string failedFolderPrefix;       ///< path of a failed run's folder, without the evaluation number that follows
   int runsAtOnce = 1;                 ///< model runs side by side, of all ranks, whose room on the disk is left to them
   int shownRuns = 0;                  ///< evaluations, the first ones, whose results hold their series in any case
+  bool hasShownSeries = true;         ///< results that may be shown hold their series
   bool isForRuns = true;              ///< model runs follow
   bool computeExactMeasures = false;  ///< results hold the measures in 64 bits, too
   bool keepSimulatedValues = false;   ///< results hold the simulated values at the observation times
