@@ -18,6 +18,9 @@ constexpr std::string_view kInitiated = " initiated";
 constexpr std::string_view kCompleted = " completed: ";
 constexpr std::string_view kReplayed = " taken from the earlier run: ";
 
+constexpr std::string_view kCounted = "Evaluations counted: ";
+constexpr std::string_view kOfThemFailed = ", failed: ";
+
 constexpr std::string_view kBest = "Best so far: ";
 constexpr std::string_view kOfEvaluation = " (evaluation ";
 constexpr std::string_view kFoundAt = ", ";
@@ -55,6 +58,19 @@ std::string repeatMessage(std::int64_t number, std::int64_t original) {
 }
 std::string replayedMessage(std::int64_t number, bool ok) {
   return nameOfEvaluation(number).append(kReplayed).append(ok ? kOk : kFailed);
+}
+
+std::string countedMessage(std::int64_t done, std::int64_t failed) {
+  return fmt::format("{}{}{}{}", kCounted, done, kOfThemFailed, failed);
+}
+
+std::optional<CountedEvaluations> readCounted(std::string_view message) {
+  if (!takeText(message, kCounted)) return std::nullopt;
+  const auto done = takeNumber(message);
+  if (!done || !takeText(message, kOfThemFailed)) return std::nullopt;
+  const auto failed = takeNumber(message);
+  if (!failed || *failed > *done) return std::nullopt;
+  return CountedEvaluations{*done, *failed};
 }
 
 std::optional<EvaluationNews> readEvaluationMessage(std::string_view message) {

@@ -62,6 +62,17 @@ std::string repeatMessage(std::int64_t number, std::int64_t original);
 /// For an evaluation whose result was taken from an earlier run.
 std::string replayedMessage(std::int64_t number, bool ok);
 
+/// What a message file that was begun anew says of the evaluations in the records that were left out.
+struct CountedEvaluations {
+  std::int64_t done = 0;  ///< including failed ones
+  std::int64_t failed = 0;
+};
+std::string countedMessage(std::int64_t done, std::int64_t failed);
+/// Empty for other messages.
+std::optional<CountedEvaluations> readCounted(std::string_view message);
+/// Before a message on an evaluation that is counted already.
+inline constexpr std::string_view kEarlier = "Earlier: ";
+
 enum class EvaluationNews { underWay, succeeded, failed };
 /// Empty for a message that is not about an evaluation.
 std::optional<EvaluationNews> readEvaluationMessage(std::string_view message);

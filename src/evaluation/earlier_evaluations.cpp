@@ -9,35 +9,49 @@
 
 namespace mirevo {
 
+namespace {
+
+class RecordsByNumber final : public EarlierRecords {
+ public:
+  explicit RecordsByNumber(std::map<int, EarlierRecord> records) : records_(std::move(records)) {}
+
+  std::optional<EarlierRecord> take(int number) override {
+    auto node = records_.extract(number);
+    return node.empty() ? std::nullopt : std::optional(std::move(node.mapped()));
+  }
+  std::vector<double> measuresOf(int number) const override {
+    const auto found = records_.find(number);
+    return found == records_.end() ? std::vector<double>() : found->second.result.measureValues;
+  }
+  bool isRepeat(int number) const override {
+    const auto found = records_.find(number);
+    return found != records_.end() && found->second.isRepeat;
+  }
+
+ private:
+  std::map<int, EarlierRecord> records_;
+};
+
+}  // namespace
+
 EarlierEvaluations::EarlierEvaluations(SearchSpace space, const ObjectiveAggregator& aggregator,
-                                       std::map<int, Record> records)
+                                       std::unique_ptr<EarlierRecords> records)
     : space_(std::move(space)), aggregator_(aggregator), records_(std::move(records)) {}
 
+EarlierEvaluations::EarlierEvaluations(SearchSpace space, const ObjectiveAggregator& aggregator,
+                                       std::map<int, Record> records)
+    : EarlierEvaluations(std::move(space), aggregator, std::make_unique<RecordsByNumber>(std::move(records))) {}
+
 std::optional<EvaluationResult> EarlierEvaluations::take(int number, std::span<const double> set) {
-  const auto found = records_.find(number);
-  if (found == records_.end()) return std::nullopt;
-  requireSameValues(number, found->second.parameterValues, set);
-  EvaluationResult result = std::move(found->second.result);
-  records_.erase(found);
+  auto record = records_->take(number);
+  if (!record) return std::nullopt;
+  requireSameValues(number, record->parameterValues, set);
+  repeated_.erase(number);
+  EvaluationResult result = std::move(record->result);
   result.number = number;
   // The transformation may have become known only after the evaluation was recorded, or may be determined again.
   result.aggregate = result.ok() ? aggregator_.aggregate(result.objectiveValues) : kFailedRunValue;
   return result;
-}
-
-bool EarlierEvaluations::repeatsRun(int number) const {
-  const auto found = records_.find(number);
-  return found != records_.end() && found->second.repeatsRun;
-}
-
-bool EarlierEvaluations::isRepeat(int number) const {
-  const auto found = records_.find(number);
-  return found != records_.end() && found->second.isRepeat;
-}
-
-const std::vector<double>* EarlierEvaluations::measuresOf(int number) const {
-  const auto found = records_.find(number);
-  return found == records_.end() ? nullptr : &found->second.result.measureValues;
 }
 
 void EarlierEvaluations::requireSameValues(int number, std::span<const double> earlier,

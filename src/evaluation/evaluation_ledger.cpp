@@ -120,9 +120,7 @@ void EvaluationLedger::putBack(std::size_t place) {
 
 std::vector<double> EvaluationLedger::repeatedMeasures(std::size_t place) const {
   if (runAgain_.contains(place)) return results_[indexOf(place)].measureValues;
-  if (earlier_ == nullptr) return {};
-  const auto* measures = earlier_->measuresOf(numberOf(place));
-  return measures == nullptr ? std::vector<double>() : *measures;
+  return earlier_ == nullptr ? std::vector<double>() : earlier_->measuresOf(numberOf(place));
 }
 
 void EvaluationLedger::markInitiated(std::size_t place) {

@@ -32,6 +32,7 @@ struct ModelDescription {
   int runsAtOnce = 1;                 ///< model runs side by side, of all ranks, whose room on the disk is left to them
   int shownRuns = 0;                  ///< evaluations, the first ones, whose results hold their series in any case
   bool reusesResults = false;         ///< a set that has succeeded is not run again
+  bool hasShownSeries = true;         ///< results that may be shown hold their series
   bool isForRuns = true;              ///< model runs follow
   bool computeExactMeasures = false;  ///< results hold the measures in 64 bits, too
   bool keepSimulatedValues = false;   ///< results hold the simulated values at the observation times

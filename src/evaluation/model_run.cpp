@@ -341,7 +341,7 @@ EvaluationResult ModelRunner::read(int slot) {
   }
   for (std::string& line : launcher_.takeWarnings()) result.warnings.push_back(std::move(line));
   // A result that may turn out to be cut off must not keep others from being shown.
-  if (result.ok() && (mayBeCutOff || shownRuns_.mayBeShown(slot, result.aggregate))) {
+  if (result.ok() && description_.hasShownSeries && (mayBeCutOff || shownRuns_.mayBeShown(slot, result.aggregate))) {
     result.shownSeries = output_->readShownSeries();
   }
   output_->release();

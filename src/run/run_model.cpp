@@ -32,6 +32,7 @@ ModelDescription describeModel(const RunConfig& config) {
   model.reusesResults = config.reusesResults();
   model.computeExactMeasures = config.usesExactMeasures();
   model.keepSimulatedValues = config.keepsSimulatedValues();
+  model.hasShownSeries = config.writesReport;
   if (config.task) model.shownRuns = config.task->shownRuns();
   if (config.task) model.keptPrecision = config.task->keptPrecision();
   if (config.task) model.keptSteps = config.task->keptSteps();

@@ -103,7 +103,7 @@ void RunReporter::recordEvaluation(std::span<const double> set, const Evaluation
 void RunReporter::recordRepeat(std::span<const double> set, const EvaluationResult& result, int original) {
   record(ToModelScale(space_, set), result, original);
   ++repeatCount_;
-  if (replayedWithoutPairs_.contains(original)) replayedWithoutPairs_.insert(result.number);
+  if (isReplayedWithoutPairs(original)) noteReplayWithoutPairs(result.number);
 }
 
 bool RunReporter::recall(int number, std::span<const double> set, EvaluationResult& result) {
@@ -171,7 +171,7 @@ void RunReporter::evaluationReplayed(std::span<const double> set, const Evaluati
   if (lacksPairs) pairs_->add(result.number, result.pairs);
   const std::vector<double> values = ToModelScale(space_, set);
   if (result.pairs.empty()) {
-    replayedWithoutPairs_.insert(result.number);
+    noteReplayWithoutPairs(result.number);
   } else {
     lastWithPairs_ = {result.number, values};
     if (searchHasEnded_ && result.ok()) finalRun_ = result.number;
@@ -263,11 +263,22 @@ std::string RunReporter::unkeptWarning() const {
       countText(files.size(), "evaluation"), fileNameOf(unkeptFiles_->path()), files.begin()->first);
 }
 
+void RunReporter::noteReplayWithoutPairs(int number) {
+  const auto place = static_cast<std::size_t>(number);
+  if (replayedWithoutPairs_.size() <= place) replayedWithoutPairs_.resize(place + 1);
+  replayedWithoutPairs_[place] = true;
+}
+
+bool RunReporter::isReplayedWithoutPairs(int number) const {
+  const auto place = static_cast<std::size_t>(number);
+  return place < replayedWithoutPairs_.size() && replayedWithoutPairs_[place];
+}
+
 std::vector<std::string> RunReporter::differencesOfBest() const {
   if (!best()) return {};
   const int number = best()->number;
   // The rows of its pairs may have been lost, so that those of the final model run, of the same set, tell.
-  const bool isKnownOfFinalRun = replayedWithoutPairs_.contains(number) && lastWithPairs_.number != number &&
+  const bool isKnownOfFinalRun = isReplayedWithoutPairs(number) && lastWithPairs_.number != number &&
                                  lastWithPairs_.parameterValues == best()->parameterValues;
   const int judged = isKnownOfFinalRun ? lastWithPairs_.number : number;
   std::vector<RunDifference> ofBest;

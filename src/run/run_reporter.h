@@ -118,6 +118,8 @@ class RunReporter final : public EvaluationObserver {
   void requireLogWritten() const;
   /// Results of earlier evaluations are right only for a model that gives them again.
   void compareFinalRun(const EvaluationResult& result);
+  void noteReplayWithoutPairs(int number);
+  bool isReplayedWithoutPairs(int number) const;
   void record(const std::vector<double>& values, const EvaluationResult& result, std::optional<int> repeats);
   /// The values of a successful evaluation and the best so far, in one line; empty without any.
   std::string valuesText(const EvaluationResult& result) const;
@@ -148,7 +150,7 @@ class RunReporter final : public EvaluationObserver {
   int firstSuccess_ = 0;  ///< with which others are compared
   /// By kind, evaluation and measure.
   std::map<std::tuple<RunDifference::Kind, int, std::size_t>, RunDifference> differences_;
-  std::set<int> replayedWithoutPairs_;  ///< as many as the first successful run, or lost ones
+  std::vector<bool> replayedWithoutPairs_;  ///< by number; as many as the first successful run, or lost ones
   /// The last evaluation of which it is known whether it differs.
   struct {
     int number = 0;

@@ -60,6 +60,7 @@ std::unique_ptr<ScenarioSeriesFile> openScenarioSeries(const RunConfig& config, 
                                                        const std::string& path, bool goesOn, RunLog& log) {
   if (!config.task || config.task->shownRuns() == 0 || output.shownMeasures().empty()) return nullptr;
   if (!goesOn) keepEarlierResults(std::array{path}, config.setupFile, log);
+  if (!config.writesReport) return nullptr;
   ScenarioSeriesFile::Settings settings;
   settings.path = path;
   settings.headLines = {columnName(config.title), fmt::format("Mirevo {}", programVersion()),
@@ -78,7 +79,7 @@ std::unique_ptr<ScenarioSeriesFile> openScenarioSeries(const RunConfig& config, 
 std::unique_ptr<SeriesRecorder> openSeries(const RunConfig& config, const SearchSpace& space, OutputReader& output,
                                            const std::string& path, bool goesOn, RunLog& log) {
   if (!goesOn) keepEarlierResults(std::array{path}, config.setupFile, log);
-  if (output.shownMeasures().empty()) return nullptr;
+  if (!config.writesReport || output.shownMeasures().empty()) return nullptr;
   RecordedSeries run;
   run.headLines = {
       columnName(config.title), fmt::format("Mirevo {}", programVersion()), "Setup file: " + config.setupFile,

@@ -12,7 +12,8 @@
 
 namespace mirevo {
 
-/// Opens the file of the series that a report shows; null if no measure compares series. What an earlier run has left
+/// Opens the file of the series that a report shows; null if no measure compares series, and
+/// where no report is wanted. What an earlier run has left
 /// there is taken up if this one `goesOn`, and otherwise renamed. `log` must outlive the recorder.
 std::unique_ptr<SeriesRecorder> openSeries(const RunConfig& config, const SearchSpace& space, OutputReader& output,
                                            const std::string& path, bool goesOn, RunLog& log);

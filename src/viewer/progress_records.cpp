@@ -92,6 +92,9 @@ void ProgressRecords::takeMessage(std::string_view text) {
     state_.title = title;
   } else if (auto origin = progress::readRunStarted(text)) {
     state_.origin = *std::move(origin);
+  } else if (const auto counted = progress::readCounted(text)) {
+    state_.done = counted->done;
+    state_.failed = counted->failed;
   } else if (const auto best = progress::readBest(text)) {
     state_.best = best;
     addCoursePoint();

@@ -116,11 +116,11 @@ class EvaluationTest : public testing::Test {
       const double measure = std::abs(value) - 1.0;
       record.parameterValues = {std::abs(value)};
       record.result = {.measureValues = {measure}, .objectiveValues = {std::abs(measure)}};
-      record.repeatsRun = number == repeated;
       if (keptPairs) record.result.pairs = {{.count = 5}};
       if (value < 0) record.result.failure = EvaluationFailure{EvaluationFailure::Kind::signal, "in the past", {}};
     }
     earlier_ = std::make_unique<EarlierEvaluations>(parameters_->searchSpace(), *aggregator_, std::move(records));
+    if (repeated > 0) earlier_->repeatRun(repeated);
   }
   void makeRunner(ProcessLauncher& launcher, int slotCount) {
     settings_.slotCount = slotCount;

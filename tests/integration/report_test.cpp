@@ -269,7 +269,8 @@ TEST(Report, IsLeftOutWhereTheSetupSaysSoAndNeverFailsTheRun) {
   folder.write("silent.kdx", folder.read("basin.kdx"));
   EXPECT_EQ(runProgram({folder / "silent.kdx"}).exitCode, 0);
   EXPECT_FALSE(folder.exists("silent_Report.html"));
-  EXPECT_TRUE(folder.exists("silent_Series.dat"));
+  EXPECT_FALSE(folder.exists("silent_Series.dat"));
+  EXPECT_FALSE(folder.exists("silent_ScenarioSeries.dat"));
   EXPECT_EQ(makeReport(folder, "silent.kdx").exitCode, 0);
   EXPECT_TRUE(folder.exists("silent_Report.html"));
 

@@ -8,6 +8,7 @@
 #include <boost/math/distributions/students_t.hpp>
 #include <fmt/core.h>
 
+#include "algorithms/numbers/gram_matrix.h"
 #include "algorithms/numbers/lapack.h"
 #include "algorithms/numbers/sample_summary.h"
 #include "common/run_files.h"
@@ -130,15 +131,22 @@ double normalise(std::vector<double>& column) {
 }
 
 /// J'WJ of the kept columns, which are normalised: k x k, with 1 on the diagonal.
-std::vector<double> gramMatrix(const std::vector<std::vector<double>>& columns, std::span<const std::size_t> kept) {
-  const std::size_t k = kept.size();
-  std::vector<double> gram(k * k);
+std::vector<double> gramOf(const std::vector<std::vector<double>>& columns, std::span<const std::size_t> kept) {
+  std::vector<std::span<const double>> used;
+  for (const std::size_t j : kept) used.emplace_back(columns[j]);
+  return gramMatrix(used);
+}
+
+/// Without one of its k rows and columns.
+std::vector<double> without(std::size_t left, const std::vector<double>& gram, std::size_t k) {
+  std::vector<double> rest;
+  rest.reserve((k - 1) * (k - 1));
   for (std::size_t i = 0; i < k; ++i) {
-    for (std::size_t j = 0; j <= i; ++j) {
-      gram[i * k + j] = gram[j * k + i] = dot(columns[kept[i]], columns[kept[j]]);
+    for (std::size_t j = 0; i != left && j < k; ++j) {
+      if (j != left) rest.push_back(gram[i * k + j]);
     }
   }
-  return gram;
+  return rest;
 }
 
 /// The coefficients of column i on the columns before it, by the triangular factor R of the Gram matrix: R b = R(., i).
@@ -192,9 +200,9 @@ std::vector<double> invertWhatCanBe(const WeightedModel& weighted, std::span<con
     }
   }
   std::vector<double> gram;
-  for (;;) {
+  for (std::vector<double> whole = gramOf(weighted.columns, result.kept);;) {
     const std::size_t k = result.kept.size();
-    gram = gramMatrix(weighted.columns, result.kept);
+    gram = whole;
     std::vector<double> noise;
     for (const std::size_t j : result.kept) noise.push_back(weighted.noise[j] / (lengths[j] * lengths[j]));
     const std::size_t dependent = k == 0 ? 0 : factorise(gram, k, noise);
@@ -202,6 +210,7 @@ std::vector<double> invertWhatCanBe(const WeightedModel& weighted, std::span<con
     result.leftOut.push_back(
         {result.kept[dependent], "its effect cannot be told from that of the parameters before it"});
     result.kept.erase(result.kept.begin() + static_cast<std::ptrdiff_t>(dependent));
+    whole = without(dependent, whole, k);
   }
   if (!gram.empty()) {
     const int n = static_cast<int>(result.kept.size());

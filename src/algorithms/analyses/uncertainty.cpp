@@ -16,6 +16,7 @@ namespace mirevo {
 
 namespace {
 
+constexpr std::size_t kMostLargeCorrelations = 10'000;
 constexpr std::int64_t kMostRedraws = 1'000'000;  // for the whole sample, and as many again for each thousand sets
 
 /// Replaces deviate i by a random value in the stratum (pi_i - 1, pi_i) / N, where pi_i is its rank among the deviates,
@@ -101,7 +102,15 @@ const SettingSection<UncertaintySection>& uncertaintySection() {
             {.name = kBandEndKeyword,
              .defaultValue = kNoDefault,
              .meaning = "With `Band_Times = 'steps'`, the end of the steps, inclusive, if it is later than `End_Date` "
-                        "of the evaluation period."})}}};
+                        "of the evaluation period."}),
+        setting<UncertaintySection>(
+            [](auto& s) -> auto& { return s.settings.matrixLimit; },
+            {.name = "Correlation_Matrix_Limit",
+             .defaultValue = "1000",
+             .range = from(0),
+             .unit = "parameters",
+             .meaning = "Number of variable parameters up to which `<setup>_SampleCorrelation.dat` has the matrix of "
+                        "all correlations. Of more parameters it has the 10,000 largest alone."})}}};
   return section;
 }
 
@@ -195,7 +204,8 @@ UncertaintyOutcome uncertaintyAnalysis(std::vector<ParameterSet> sample, Evaluat
   return outcome;
 }
 
-UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome, const SearchSpace& space) {
+UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome, const SearchSpace& space,
+                                        std::int32_t matrixLimit) {
   std::vector<std::vector<double>> modelValues;
   for (const ParameterSet& set : outcome.sample) modelValues.push_back(ToModelScale(space, set));
   std::vector<const EvaluationResult*> successful;
@@ -213,7 +223,11 @@ UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome, const
     for (std::size_t i = 0; i < steps.size(); ++i) steps[i] = modelValues[i][j];
     summary.parameters[j] = summariseSample(steps, QuantileKind::ofValues);
   }
-  summary.correlations = correlationMatrix(modelValues);
+  if (space.size() <= static_cast<std::size_t>(matrixLimit)) {
+    summary.correlations = correlationMatrix(modelValues);
+  } else {
+    summary.largestCorrelations = largestCorrelations(SampleCorrelations(modelValues), kMostLargeCorrelations);
+  }
   summary.measures = summariseColumns(
       successful.size(), [&](std::size_t i) -> auto& { return successful[i]->measureValues; });
   summary.objectives = summariseColumns(
@@ -222,6 +236,26 @@ UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome, const
       successful.size(), [&](std::size_t i) -> auto& { return successful[i]->validationValues; });
   return summary;
 }
+
+namespace {
+
+DataTable correlationTable(const UncertaintySummary& summary, const AnalysisNames& names) {
+  const std::string title = "Correlation of the parameters of all sets evaluated, model scale";
+  if (summary.largestCorrelations.empty()) {
+    return matrixTable(run_files::kSampleCorrelation, title, names.parameters, summary.correlations);
+  }
+  DataTable table;
+  table.file = run_files::kSampleCorrelation;
+  table.headLines = {fmt::format("{}: the {} largest of {} parameters", title, summary.largestCorrelations.size(),
+                                 names.parameters.size())};
+  table.columns = {"First", "Second", "Correlation"};
+  for (const PairCorrelation& one : summary.largestCorrelations) {
+    table.rows.push_back({names.parameters[one.first], names.parameters[one.second], one.value});
+  }
+  return table;
+}
+
+}  // namespace
 
 std::vector<DataTable> uncertaintyTables(const UncertaintySummary& summary, const AnalysisNames& names) {
   DataTable table;
@@ -244,9 +278,7 @@ std::vector<DataTable> uncertaintyTables(const UncertaintySummary& summary, cons
   add("measure", names.measures, summary.measures);
   add("objective", names.objectives, summary.objectives);
   add("validation", names.validation, summary.validation);
-  return {std::move(table),
-          matrixTable(run_files::kSampleCorrelation, "Correlation of the parameters of all sets evaluated, model scale",
-                      names.parameters, summary.correlations)};
+  return {std::move(table), correlationTable(summary, names)};
 }
 
 std::vector<std::string> formatUncertainty(const UncertaintySummary& summary, const AnalysisNames& names,
@@ -259,8 +291,13 @@ std::vector<std::string> formatUncertainty(const UncertaintySummary& summary, co
   appendSummaries(lines, "Objective function", names.objectives, summary.objectives);
   if (!names.validation.empty()) appendSummaries(lines, "Validation", names.validation, summary.validation);
   lines.emplace_back();
-  for (std::string& line :
-       formatCorrelation("Sample correlation", names.parameters, summary.correlations, correlationFile)) {
+  const std::string title = "Sample correlation";
+  const std::span<const PairCorrelation> largest = summary.largestCorrelations;
+  for (std::string& line : largest.empty()
+                               ? formatCorrelation(title, names.parameters, summary.correlations, correlationFile)
+                               : formatLargest(title, names.parameters, largest,
+                                               fmt::format("The {} largest correlations of the {} parameters are in {}",
+                                                           largest.size(), names.parameters.size(), correlationFile))) {
     lines.push_back(std::move(line));
   }
   return lines;

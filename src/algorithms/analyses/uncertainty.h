@@ -33,6 +33,8 @@ inline constexpr CodeName kSamplingTypeNames[] = {{0, "simple random"}, {1, "Lat
 enum class BandTimes : std::int32_t { observations, steps };
 inline constexpr CodeName kBandTimesNames[] = {{std::nullopt, "observations"}, {std::nullopt, "steps"}};
 
+inline constexpr std::int32_t kMatrixLimit = 1000;
+
 struct UncertaintySettings {
   SamplingType samplingType = SamplingType::simpleRandom;
   std::int32_t sampleSize = 0;                 ///< N, at least 2
@@ -40,6 +42,8 @@ struct UncertaintySettings {
   bool redrawsInfeasible = false;              ///< whether sets that cannot be run are drawn again
   BandTimes bandTimes = BandTimes::observations;
   std::optional<DateRecord> bandEnd;  ///< of the steps; empty: that of the evaluation period
+  /// Of more parameters only the largest correlations are kept: the matrix grows with the square of their number.
+  std::int32_t matrixLimit = kMatrixLimit;
 };
 
 inline constexpr std::string_view kSampleSizeKeyword = "Sample_Size";
@@ -96,13 +100,16 @@ struct UncertaintySummary {
   std::size_t evaluationCount = 0;
   std::size_t failedCount = 0;                    ///< left out of the statistics of measures and objective functions
   std::vector<SampleSummary> parameters;          ///< of all sets evaluated, as the model gets them
-  std::vector<std::vector<double>> correlations;  ///< of the same values
+  std::vector<std::vector<double>> correlations;  ///< of the same values; empty if only the largest are kept
+  std::vector<PairCorrelation> largestCorrelations;
   std::vector<SampleSummary> measures;
   std::vector<SampleSummary> objectives;
   std::vector<SampleSummary> validation;  ///< of measures in validation periods
 };
 
-UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome, const SearchSpace& space);
+/// `matrixLimit`: see UncertaintySettings.
+UncertaintySummary summariseUncertainty(const UncertaintyOutcome& outcome, const SearchSpace& space,
+                                        std::int32_t matrixLimit = kMatrixLimit);
 
 /// The summary as tables for programs: mean, standard deviation and quantiles of each parameter (model scale), measure
 /// and objective function; the correlation of the sampled parameters.

@@ -74,16 +74,65 @@ double sampleCorrelation(std::span<const double> a, std::span<const double> b) {
 }
 
 std::vector<std::vector<double>> correlationMatrix(std::span<const std::vector<double>> rows) {
-  const std::size_t p = rows.empty() ? 0 : rows.front().size();
-  std::vector<std::vector<double>> columns(p);
-  for (const std::vector<double>& row : rows) {
-    for (std::size_t j = 0; j < p; ++j) columns[j].push_back(row[j]);
-  }
+  const SampleCorrelations correlations(rows);
+  const std::size_t p = correlations.size();
   std::vector<std::vector<double>> matrix(p, std::vector<double>(p, 1.0));
   for (std::size_t i = 0; i < p; ++i) {
-    for (std::size_t j = 0; j < i; ++j) matrix[i][j] = matrix[j][i] = sampleCorrelation(columns[i], columns[j]);
+    for (std::size_t j = 0; j < i; ++j) matrix[i][j] = matrix[j][i] = correlations.of(i, j);
   }
   return matrix;
+}
+
+SampleCorrelations::SampleCorrelations(std::span<const std::vector<double>> rows) : count_(rows.size()) {
+  const std::size_t p = rows.empty() ? 0 : rows.front().size();
+  centred_.reserve(p * count_);
+  std::vector<double> column(count_);
+  for (std::size_t j = 0; j < p; ++j) {
+    for (std::size_t i = 0; i < count_; ++i) column[i] = rows[i][j];
+    const double mean = meanOf(column);
+    double squares = 0.0;
+    for (const double value : column) {
+      centred_.push_back(value - mean);
+      squares += centred_.back() * centred_.back();
+    }
+    roots_.push_back(std::sqrt(squares));
+  }
+}
+
+double SampleCorrelations::of(std::size_t i, std::size_t j) const {
+  const std::size_t high = std::max(i, j);  // one order of the two divisions, whose rounding depends on it
+  const std::size_t low = std::min(i, j);
+  if (!(roots_[high] > 0.0) || !(roots_[low] > 0.0)) return kNaN;
+  const double* const a = centred_.data() + high * count_;
+  const double* const b = centred_.data() + low * count_;
+  double sum = 0.0;
+  for (std::size_t k = 0; k < count_; ++k) sum += a[k] * b[k];
+  return std::clamp(sum / roots_[high] / roots_[low], -1.0, 1.0);
+}
+
+std::vector<PairCorrelation> largestCorrelations(const SampleCorrelations& correlations, std::size_t count) {
+  const auto isLarger = [](const PairCorrelation& a, const PairCorrelation& b) {
+    const double ofA = std::abs(a.value);
+    const double ofB = std::abs(b.value);
+    if (ofA != ofB) return ofA > ofB;
+    return std::pair(a.first, a.second) < std::pair(b.first, b.second);
+  };
+  std::vector<PairCorrelation> largest;  // a heap, with the smallest of them in front
+  for (std::size_t j = 1; count > 0 && j < correlations.size(); ++j) {
+    for (std::size_t i = 0; i < j; ++i) {
+      const PairCorrelation found{i, j, correlations.of(i, j)};
+      if (std::isnan(found.value)) continue;
+      if (largest.size() == count) {
+        if (!isLarger(found, largest.front())) continue;
+        std::pop_heap(largest.begin(), largest.end(), isLarger);
+        largest.pop_back();
+      }
+      largest.push_back(found);
+      std::push_heap(largest.begin(), largest.end(), isLarger);
+    }
+  }
+  std::sort_heap(largest.begin(), largest.end(), isLarger);
+  return largest;
 }
 
 DataTable matrixTable(const RunFile& file, std::string headLine, std::span<const std::string> names,
@@ -124,7 +173,6 @@ std::vector<std::string> formatTable(const std::string& corner, std::span<const 
 }
 
 std::vector<MatrixEntry> largestEntries(std::span<const std::vector<double>> matrix) {
-  constexpr std::size_t kLargestShown = 10;
   std::vector<MatrixEntry> entries;
   for (std::size_t i = 0; i < matrix.size(); ++i) {
     for (std::size_t j = i + 1; j < matrix.size(); ++j) {
@@ -141,15 +189,23 @@ std::vector<MatrixEntry> largestEntries(std::span<const std::vector<double>> mat
 std::vector<std::string> formatCorrelation(const std::string& title, std::span<const std::string> names,
                                            std::span<const std::vector<double>> matrix, std::string_view file) {
   if (matrix.size() <= kMostShownParameters) return formatTable(title, names, names, matrix);
+  std::vector<PairCorrelation> largest;
+  for (const auto& [i, j] : largestEntries(matrix)) largest.push_back({i, j, matrix[i][j]});
+  return formatLargest(title, names, largest,
+                       fmt::format("All correlations of the {} parameters are in {}", names.size(), file));
+}
+
+std::vector<std::string> formatLargest(const std::string& title, std::span<const std::string> names,
+                                       std::span<const PairCorrelation> largest, const std::string& note) {
   std::vector<std::string> pairs;
   std::vector<std::vector<double>> values;
-  for (const auto& [i, j] : largestEntries(matrix)) {
-    pairs.push_back(fmt::format("{}, {}", names[i], names[j]));
-    values.push_back({matrix[i][j]});
+  for (const PairCorrelation& one : largest.first(std::min(largest.size(), kLargestShown))) {
+    pairs.push_back(fmt::format("{}, {}", names[one.first], names[one.second]));
+    values.push_back({one.value});
   }
   const std::string headings[] = {"Largest"};
   std::vector<std::string> lines = formatTable(title, headings, pairs, values);
-  lines.push_back(fmt::format("   All correlations of the {} parameters are in {}", names.size(), file));
+  lines.push_back("   " + note);
   return lines;
 }
 

@@ -40,6 +40,31 @@ double sortedQuantile(std::span<const double> ascending, double probability,
 /// values.
 double sampleCorrelation(std::span<const double> a, std::span<const double> b);
 
+/// The correlations of the columns of a sample, each computed when it is asked for: sampleCorrelation() of the two.
+class SampleCorrelations final {
+ public:
+  /// `rows`: n rows of p values each.
+  explicit SampleCorrelations(std::span<const std::vector<double>> rows);
+
+  std::size_t size() const { return roots_.size(); }
+  double of(std::size_t i, std::size_t j) const;
+
+ private:
+  std::size_t count_ = 0;        ///< n
+  std::vector<double> centred_;  ///< one column after another, without their means
+  std::vector<double> roots_;    ///< square roots of the sums of their squares
+};
+
+/// The correlation of two parameters, 0-based.
+struct PairCorrelation {
+  std::size_t first = 0;
+  std::size_t second = 0;
+  double value = 0.0;
+};
+/// The `count` correlations of different columns with the largest absolute values, the largest first; of equals that of
+/// the first columns. NaN is left out.
+std::vector<PairCorrelation> largestCorrelations(const SampleCorrelations& correlations, std::size_t count);
+
 /// The correlation matrix of the columns of `rows` (n rows of p values each), p x p, with 1 on the diagonal.
 std::vector<std::vector<double>> correlationMatrix(std::span<const std::vector<double>> rows);
 
@@ -56,10 +81,16 @@ std::vector<std::string> formatTable(const std::string& corner, std::span<const 
 /// its own.
 inline constexpr std::size_t kMostShownParameters = 10;
 
+inline constexpr std::size_t kLargestShown = 10;
+
 /// The two parameters of an entry of a matrix, 0-based, row below column.
 using MatrixEntry = std::pair<std::size_t, std::size_t>;
 /// The 10 entries above the diagonal with the largest absolute values, the largest first; NaN is left out.
 std::vector<MatrixEntry> largestEntries(std::span<const std::vector<double>> matrix);
+
+/// The largest correlations as lines of text; `note` is the last line.
+std::vector<std::string> formatLargest(const std::string& title, std::span<const std::string> names,
+                                       std::span<const PairCorrelation> largest, const std::string& note);
 
 /// A correlation matrix as lines of text: the table of up to kMostShownParameters; of more the largestEntries() alone
 /// and the name of the `file` that has all.

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cmath>
 
+#include "algorithms/numbers/gram_matrix.h"
 #include "algorithms/numbers/lapack.h"
 
 namespace mirevo {
@@ -34,15 +35,18 @@ bool QuadraticSurrogate::fit(std::span<const std::vector<double>> points, std::s
   }
 
   const std::size_t size = quadraticCoefficientCount(n);
-  std::vector<double> normal(size * size, 0.0);  // the lower triangle of XᵀX
-  std::vector<double> moments(size, 0.0);        // Xᵀy
+  std::vector<double> design(size * points.size());  // X, one column after another
+  std::vector<double> moments(size, 0.0);            // Xᵀy
   for (std::size_t i = 0; i < points.size(); ++i) {
     const std::vector<double> row = terms(points[i]);
     for (std::size_t column = 0; column < size; ++column) {
       moments[column] += row[column] * values[i];
-      for (std::size_t k = column; k < size; ++k) normal[column * size + k] += row[column] * row[k];
+      design[column * points.size() + i] = row[column];
     }
   }
+  std::vector<std::span<const double>> columns;
+  for (std::size_t k = 0; k < size; ++k) columns.push_back(std::span(design).subspan(k * points.size(), points.size()));
+  const std::vector<double> normal = gramMatrix(columns);  // XᵀX
   // The ridge grows until the matrix is positive definite in floating point.
   double ridge = 1.0e-8 * count;
   while (ridge <= count) {

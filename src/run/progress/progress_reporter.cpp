@@ -29,6 +29,9 @@ constexpr std::size_t kSpeedWindow = 100;   ///< evaluations
 /// Longest wait for a pipe or terminal to accept a record. After that there is no waiting until it accepts one again,
 /// so that a reader that has stopped reading does not slow down the run.
 constexpr int kPatienceMilliseconds = 1000;
+/// Of records that are written together: bytes, which a pipe's reader gets in one piece, and seconds.
+constexpr std::size_t kMostWaiting = 3500;
+constexpr double kLongestWait = 0.1;
 
 std::string baseNameOf(std::string_view runFileName) {
   for (const std::string_view ending : {run_files::kLog.extension, std::string_view(".inp")}) {
@@ -41,13 +44,15 @@ std::string baseNameOf(std::string_view runFileName) {
 
 }  // namespace
 
-ProgressReporter::ProgressReporter(Clock clock) : clock_(std::move(clock)) {}
+ProgressReporter::ProgressReporter(Clock clock, std::size_t mostBytes)
+    : clock_(std::move(clock)), mostBytes_(mostBytes) {}
 
 ProgressReporter::~ProgressReporter() {
   closeMessageFile();
 }
 
 bool ProgressReporter::closeMessageFile() {
+  writeAdded();
   const int descriptor = std::exchange(messageUnit_, kNowhere);
   if (descriptor <= kStandardOutput) return true;
   signalState.messageFileDescriptor = -1;
@@ -96,12 +101,16 @@ void ProgressReporter::addRecord(std::string_view kind, std::string_view text) {
     if (kind != progress::kMessage) return;
     record.replace(0, kind.size(), " ");  // list-directed output begins with a blank
   }
+  if (isOnDisk_) summary_.take(kind, std::string_view(record).substr(kind.size(), record.size() - kind.size() - 1));
   added_ += record;
 }
 
 void ProgressReporter::writeAdded() {
   std::string records = std::exchange(added_, {});
-  if (messageUnit_ < 0 || records.empty()) return;
+  if (messageUnit_ >= 0 && !records.empty()) write(std::move(records));
+}
+
+void ProgressReporter::write(std::string records) {
   if (isLineUnfinished_) records.insert(records.begin(), '\n');
   const int descriptor = messageUnit_ == kStandardOutput ? STDOUT_FILENO : messageUnit_;
   const int patience = isOnDisk_ ? kAsLongAsItTakes : isReaderBusy_ ? 0 : kPatienceMilliseconds;
@@ -109,8 +118,23 @@ void ProgressReporter::writeAdded() {
   const OutputResult result = writeWhole(descriptor, records, patience);
   isReaderBusy_ = result.error == EAGAIN;  // the record is lost
   if (result.taken > 0) isLineUnfinished_ = result.taken < records.size();
+  bytes_ += result.taken;
   // A full disk or a closed pipe ends the reporting and not the run.
-  if (result.error != 0 && !isReaderBusy_) giveUp(result.error);
+  if (result.error != 0 && !isReaderBusy_) return giveUp(result.error);
+  if (isOnDisk_ && bytes_ > mostBytes_) beginAnew();
+}
+
+/// In place, so that a reader that has the file open goes on, too.
+void ProgressReporter::beginAnew() {
+  const EndingSignalsHeld held;  // whose records come last
+  if (::ftruncate(messageUnit_, 0) != 0) {
+    isOnDisk_ = false;  // it is none that can be begun anew
+    return;
+  }
+  bytes_ = 0;
+  isLineUnfinished_ = false;
+  mostBytes_ = std::max(mostBytes_, 4 * summary_.records().size());
+  write(summary_.records());
 }
 
 void ProgressReporter::writeRecord(std::string_view kind, std::string_view text) {
@@ -167,18 +191,24 @@ void ProgressReporter::progressStep() {
   isCancelled();
 }
 
-void ProgressReporter::addPercentage() {
+void ProgressReporter::addPercentage(bool isReplay) {
   if (plannedEvaluations_ <= 0) return;
   const double percent = std::min(100.0, 100.0 * completedEvaluations_ / plannedEvaluations_);
-  addRecord(progress::kPercentage, fmt::format("{:.1f}", percent));
+  std::string text = fmt::format("{:.1f}", percent);
+  if (isReplay && text == percentage_) return;
+  percentage_ = std::move(text);
+  addRecord(progress::kPercentage, percentage_);
 }
 
 void ProgressReporter::progressReplayed(int number, bool ok) {
   ++completedEvaluations_;
+  if (added_.empty()) addedSince_ = clock_();
   addRecord(progress::kMessage, progress::replayedMessage(number, ok));
-  addPercentage();  // the next evaluation may take hours
-  writeAdded();
+  addPercentage(true);  // the next evaluation may take hours
   times_.assign(1, clock_());
+  // Thousands may be replayed in a second, and a write for each would take longer than that.
+  const bool mayWait = isOnDisk_ && added_.size() <= kMostWaiting && times_.front() - addedSince_ <= kLongestWait;
+  if (!mayWait) writeAdded();
 }
 
 void ProgressReporter::progressBest(int number, double aggregate, std::string_view foundAt) {

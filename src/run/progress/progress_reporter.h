@@ -1,11 +1,14 @@
 #pragma once
 
+#include <cstddef>
 #include <deque>
 #include <functional>
 #include <limits>
 #include <string>
 #include <string_view>
 #include <utility>
+
+#include "run/progress/record_summary.h"
 
 namespace mirevo {
 
@@ -15,8 +18,10 @@ class ProgressReporter final {
  public:
   /// Seconds from an arbitrary origin, never decreasing.
   using Clock = std::function<double()>;
+  static constexpr std::size_t kMostBytes = 16'000'000;
 
-  explicit ProgressReporter(Clock clock);
+  /// `mostBytes`: a message file that has become longer is begun anew, with what its records say in short.
+  explicit ProgressReporter(Clock clock, std::size_t mostBytes = kMostBytes);
   ~ProgressReporter();
   ProgressReporter(const ProgressReporter&) = delete;
   ProgressReporter& operator=(const ProgressReporter&) = delete;
@@ -56,11 +61,14 @@ class ProgressReporter final {
   bool isCancelled();
 
  private:
-  void addPercentage();
+  /// Of a replay only one that is another than the last.
+  void addPercentage(bool isReplay = false);
   /// Adds a record to those that the next writeAdded() writes.
   void addRecord(std::string_view kind, std::string_view text);
   void writeAdded();
   void writeRecord(std::string_view kind, std::string_view text);
+  void write(std::string records);
+  void beginAnew();
   /// False, with errno set, when what was written may not be in the file.
   bool closeMessageFile();
   void giveUp(int error);
@@ -70,7 +78,12 @@ class ProgressReporter final {
   std::function<void(std::string_view)> listener_;
   std::string baseName_;
   std::string problem_;
-  std::string added_;
+  std::string added_;        ///< records that are not written yet
+  double addedSince_ = 0.0;  ///< the first of these
+  std::size_t mostBytes_;
+  std::size_t bytes_ = 0;   ///< of the message file
+  std::string percentage_;  ///< that was written last
+  RecordSummary summary_;
   int messageUnit_ = -1;           ///< < 0 nowhere, 0 standard output, > 0 the message file's descriptor
   bool isOnDisk_ = false;          ///< the message file is no pipe
   bool isReaderBusy_ = false;      ///< the reader has not accepted the latest record

@@ -4,7 +4,6 @@
 #include <cerrno>
 #include <iterator>
 #include <set>
-#include <span>
 #include <sys/stat.h>
 #include <utility>
 
@@ -90,25 +89,24 @@ struct LostRows {
   std::size_t missing = 0;  ///< without such a line, though there is a checksum
 };
 
-LostRows countLostRows(const ResultTable& table, const RowChecksums& checksums, int planned) {
-  std::set<int> whole;
-  for (const ResultRow& row : table.rows) whole.insert(row.number);
-  const auto isLost = [&](int number) { return number >= 1 && number <= planned && whole.count(number) == 0; };
+/// `rows` in order.
+LostRows countLostRows(const ResultTable& table, const ResultRows& rows, const RowChecksums& checksums, int planned) {
+  const auto isLost = [&](int number) { return number >= 1 && number <= planned && !rows.has(number); };
   const std::set<int>& damaged = table.numbersOfUnusable;
   std::set<int> missing;
   for (const auto& [number, checksum] : checksums) {
     if (isLost(number) && damaged.count(number) == 0) missing.insert(number);
   }
   // Its number may be cut, too. Where no row is missing it is none of the run's.
-  const std::size_t cut = table.hasCutRow && std::ssize(whole) < planned ? 1 : 0;
+  const std::size_t cut = table.hasCutRow && std::ssize(rows) < planned ? 1 : 0;
   return {static_cast<std::size_t>(std::count_if(damaged.begin(), damaged.end(), isLost)) + cut,
           missing.size() - std::min(missing.size(), cut)};
 }
 
 /// Rows that cannot be read are made again; one that can be read and does not hold would have been believed, and only
 /// the user can tell what it was. Returns how many rows have no checksum.
-std::size_t requireRowsThatHold(const std::vector<ResultRow>& rows, const RowChecksums& checksums,
-                                const RestartFiles& files, const RunConfig& config) {
+std::size_t requireRowsThatHold(const ResultRows& rows, const RowChecksums& checksums, const RestartFiles& files,
+                                const RunConfig& config) {
   const CheckedRows checked = checkRows(rows, checksums, config, RowOrigin::thisSetup);
   if (checked.faults.empty()) return checked.withoutChecksum;
   std::string detail = fmt::format("{} has rows that do not hold:", files.results);
@@ -126,9 +124,9 @@ std::size_t requireRowsThatHold(const std::vector<ResultRow>& rows, const RowChe
 }
 
 /// The number of the last evaluation before which none is missing.
-int lastWithoutGap(std::span<const ResultRow> rows) {
+int lastWithoutGap(const ResultRows& rows) {
   int last = 0;
-  while (last < std::ssize(rows) && rows[static_cast<std::size_t>(last)].number == last + 1) ++last;
+  while (last < std::ssize(rows) && rows.number(static_cast<std::size_t>(last)) == last + 1) ++last;
   return last;
 }
 
@@ -137,32 +135,33 @@ void raiseBudget(const Task& task, int earlierBudget, EarlierRun& run) {
   const auto raised = task.raisedBudget({earlierBudget, lastWithoutGap(run.rows), run.searches});
   if (!raised) return;
   if (!raised->refusal.empty()) refuse(raised->refusal);
-  const auto isObsolete = [&raised](const ResultRow& row) { return row.number > raised->keptEvaluations; };
-  run.rows.erase(std::remove_if(run.rows.begin(), run.rows.end(), isObsolete), run.rows.end());
+  run.rows.keepIf([&](std::size_t i) { return run.rows.number(i) <= raised->keptEvaluations; });
   if (raised->earlier) run.searches.push_back(*raised->earlier);
   if (!raised->note.empty()) run.notes.push_back(raised->note);
 }
 
 /// Drops the failed evaluations after the last successful one: their cause may have been removed since.
 void dropFailuresAtEnd(EarlierRun& run) {
-  const auto isOk = [](const ResultRow& row) { return row.ok; };
-  const auto end = std::find_if(run.rows.rbegin(), run.rows.rend(), isOk).base();
-  const auto count = std::distance(end, run.rows.end());
-  run.rows.erase(end, run.rows.end());
+  std::size_t kept = run.rows.size();
+  while (kept > 0 && !run.rows.isOk(kept - 1)) --kept;
+  const std::size_t count = run.rows.size() - kept;
+  run.rows.keepIf([kept](std::size_t i) { return i < kept; });
   run.notes.push_back(fmt::format("Restart = 2: {} failed evaluations at the end are made again", count));
 }
 
 /// findEarlierRun() of a result file with this text.
-std::optional<EarlierRun> earlierRunIn(const std::string& text, const RestartFiles& files, const RunConfig& config,
+std::optional<EarlierRun> earlierRunIn(std::string text, const RestartFiles& files, const RunConfig& config,
                                        const ResultColumns& columns, std::optional<RunRecord> record) {
   if (text.empty()) return std::nullopt;
   refuseLaterVersion(files.settings, record);
-  ResultTable table = readResultTable(text, columns);
+  ResultRows rows;
+  const ResultTable table = readResultTable(text, columns, rows);
+  text = {};
   // Not just a cut-off beginning: there may be days of work below a damaged header row.
   if (!table.hasHeader && table.unusableLines > 1) {
     refuse(files.results + " has no header row that can be read", files.results, run_files::kPlain.results);
   }
-  if (table.rows.empty() && table.rowsOfOtherColumns == 0) return std::nullopt;
+  if (rows.empty() && table.rowsOfOtherColumns == 0) return std::nullopt;
   const RestartSettings then = readSettings(files.settings);
   const RestartSettings now = restartSettings(config);
   requireSameSettings(then, now);
@@ -171,11 +170,11 @@ std::optional<EarlierRun> earlierRunIn(const std::string& text, const RestartFil
   }
 
   const RowChecksums checksums = readRowChecksums(readFileIfThere(files.checksums).value_or(""));
-  const std::size_t withoutChecksum = requireRowsThatHold(table.rows, checksums, files, config);
-  const LostRows lost = countLostRows(table, checksums, config.plannedModelRuns());
+  const std::size_t withoutChecksum = requireRowsThatHold(rows, checksums, files, config);
+  rows.putInOrder();
+  const LostRows lost = countLostRows(table, rows, checksums, config.plannedModelRuns());
   if (!record) record = recordOfEarlierVersion(table);
-  EarlierRun run{std::move(table.rows), std::move(record->started), std::move(record->restarted), then.searches, {}};
-  putInOrder(run.rows);
+  EarlierRun run{std::move(rows), std::move(record->started), std::move(record->restarted), then.searches, {}};
   if (lost.damaged > 0) {
     run.notes.push_back(
         fmt::format("Rows of {} that were cut off or damaged are made again: {}", files.results, lost.damaged));
@@ -199,6 +198,50 @@ std::optional<EarlierRun> earlierRunIn(const std::string& text, const RestartFil
   return run;
 }
 
+/// Makes each record when it is asked for.
+class RecordsOfRows final : public EarlierRecords {
+ public:
+  RecordsOfRows(ResultRows rows, BesideRows beside)
+      : rows_(std::move(rows)), beside_(std::move(beside)), isTaken_(rows_.size()) {}
+
+  std::optional<EarlierRecord> take(int number) override {
+    const std::size_t index = rows_.find(number);
+    if (index == rows_.size() || isTaken_[index]) return std::nullopt;
+    isTaken_[index] = true;
+    rows_.read(index, row_);
+    EarlierRecord record;
+    record.parameterValues = row_.parameters;
+    record.result.number = number;
+    record.result.measureValues = row_.measures;
+    record.result.objectiveValues = row_.objectives;
+    record.result.validationValues = row_.validation;
+    if (const auto found = beside_.pairs.find(number); found != beside_.pairs.end()) {
+      record.result.pairs = std::move(found->second);
+    }
+    if (!row_.ok) {
+      record.result.failure = beside_.failures.at(number);
+    } else if (const auto kept = beside_.keptValues.find(number); kept != beside_.keptValues.end()) {
+      record.result.simulatedValues = std::move(kept->second.simulatedValues);
+      record.result.exactMeasures = std::move(kept->second.exactMeasures);
+    }
+    return record;
+  }
+  std::vector<double> measuresOf(int number) const override {
+    const std::size_t index = rows_.find(number);
+    return index == rows_.size() || isTaken_[index] ? std::vector<double>() : rows_[index].measures;
+  }
+  bool isRepeat(int number) const override {
+    const std::size_t index = rows_.find(number);
+    return index < rows_.size() && !isTaken_[index] && rows_.repeats(index).value_or(0) > 0;
+  }
+
+ private:
+  ResultRows rows_;
+  BesideRows beside_;
+  std::vector<bool> isTaken_;
+  ResultRow row_;  ///< whose memory is used again
+};
+
 }  // namespace
 
 RestartFiles restartFiles(const std::string& filePrefix, const ResultFileNames& names) {
@@ -210,12 +253,12 @@ RestartFiles restartFiles(const std::string& filePrefix, const ResultFileNames& 
 
 std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunConfig& config,
                                          const ResultColumns& columns, std::optional<RunRecord> record) {
-  const std::string text = readFileIfThere(files.results).value_or("");
+  std::string text = readFileIfThere(files.results).value_or("");
   const std::string setup = setupNamedIn(text);
   if (setup.empty() || isSameSetup(setup, config.setupFile))
-    return earlierRunIn(text, files, config, columns, std::move(record));
+    return earlierRunIn(std::move(text), files, config, columns, std::move(record));
   try {
-    return earlierRunIn(text, files, config, columns, std::move(record));  // the setup may have been renamed
+    return earlierRunIn(std::move(text), files, config, columns, std::move(record));  // the setup may have been renamed
   } catch (const FatalError& error) {
     fatalError(error.message(),
                fmt::format("{} names another setup, {}. If it is not this one under its earlier name, give one of the "
@@ -224,42 +267,18 @@ std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunCon
   }
 }
 
-std::map<int, EarlierEvaluations::Record> earlierRecords(EarlierRun& run,
-                                                         const std::map<int, EvaluationFailure>& failures,
-                                                         const PairsByNumber& pairs,
-                                                         std::optional<std::map<int, KeptValues>> keptValues) {
-  if (keptValues) {
-    const auto isIncomplete = [&](const ResultRow& row) { return row.ok && keptValues->count(row.number) == 0; };
-    run.rows.erase(std::remove_if(run.rows.begin(), run.rows.end(), isIncomplete), run.rows.end());
-  }
-  std::map<int, EarlierEvaluations::Record> records;
-  for (const ResultRow& row : run.rows) {
-    EarlierEvaluations::Record& record = records[row.number];
-    record.parameterValues = row.parameters;
-    record.result.number = row.number;
-    record.result.measureValues = row.measures;
-    record.result.objectiveValues = row.objectives;
-    record.result.validationValues = row.validation;
-    record.isRepeat = row.repeats.value_or(0) > 0;
-    if (const auto found = pairs.find(row.number); found != pairs.end()) record.result.pairs = found->second;
-    if (!row.ok) {
-      record.result.failure = failures.at(row.number);
-    } else if (keptValues) {
-      KeptValues& kept = keptValues->at(row.number);
-      record.result.simulatedValues = std::move(kept.simulatedValues);
-      record.result.exactMeasures = std::move(kept.exactMeasures);
-    }
-  }
-  return records;
+std::unique_ptr<EarlierRecords> earlierRecords(ResultRows rows, BesideRows beside) {
+  return std::make_unique<RecordsOfRows>(std::move(rows), std::move(beside));
 }
 
-int firstWithoutPairs(std::span<const ResultRow> rows, const PairsByNumber& pairs, std::size_t count) {
-  const auto first = std::find_if(rows.begin(), rows.end(), [](const ResultRow& row) { return row.ok; });
-  if (first == rows.end()) return 0;
+int firstWithoutPairs(const ResultRows& rows, const PairsByNumber& pairs, std::size_t count) {
+  std::size_t first = 0;
+  while (first < rows.size() && !rows.isOk(first)) ++first;
+  if (first == rows.size() || count == 0) return 0;
   // The row of an earlier one may be lost, which is then made again.
-  const auto isKnown = std::any_of(pairs.begin(), pairs.upper_bound(first->number),
+  const auto isKnown = std::any_of(pairs.begin(), pairs.upper_bound(rows.number(first)),
                                    [count](const auto& entry) { return entry.second.size() >= count; });
-  return isKnown || count == 0 ? 0 : first->number;
+  return isKnown ? 0 : rows.number(first);
 }
 
 void RestartSettingsFile::write(const RunConfig& config) {

@@ -4,8 +4,8 @@
 #include <cstdint>
 #include <functional>
 #include <map>
+#include <memory>
 #include <optional>
-#include <span>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -41,7 +41,7 @@ RestartFiles restartFiles(const std::string& filePrefix, const ResultFileNames& 
 
 /// An earlier run that is to be continued.
 struct EarlierRun {
-  std::vector<ResultRow> rows;  ///< in the order of their numbers
+  ResultRows rows;  ///< in the order of their numbers
   std::string started;
   std::vector<std::string> restarted;
   /// DDS: the searches that this one continues.
@@ -56,17 +56,19 @@ struct EarlierRun {
 std::optional<EarlierRun> findEarlierRun(const RestartFiles& files, const RunConfig& config,
                                          const ResultColumns& columns, std::optional<RunRecord> record);
 
-/// The evaluations of an earlier run by number. `failures`: the reasons of the failed ones. `keptValues`: those of the
-/// others, if the task uses any; evaluations without them are left out, and therefore repeated. `pairs`: of the
-/// first successful run and of runs that have others.
-std::map<int, EarlierEvaluations::Record> earlierRecords(EarlierRun& run,
-                                                         const std::map<int, EvaluationFailure>& failures,
-                                                         const PairsByNumber& pairs,
-                                                         std::optional<std::map<int, KeptValues>> keptValues);
+/// What the files beside the rows have of their evaluations.
+struct BesideRows {
+  std::map<int, EvaluationFailure> failures;  ///< the reasons of the failed ones
+  PairsByNumber pairs;                        ///< of the first successful run and of runs that have others
+  std::map<int, KeptValues> keptValues;       ///< of the successful ones, if the task uses any
+};
+
+/// The evaluations of an earlier run.
+std::unique_ptr<EarlierRecords> earlierRecords(ResultRows rows, BesideRows beside);
 
 /// The number of the first successful evaluation in `rows`, which are in the order of their numbers, if `pairs` has not
 /// `count` of it, and of none before it; otherwise 0.
-int firstWithoutPairs(std::span<const ResultRow> rows, const PairsByNumber& pairs, std::size_t count);
+int firstWithoutPairs(const ResultRows& rows, const PairsByNumber& pairs, std::size_t count);
 
 /// The settings of a run on disk. Without them its rows cannot be taken up, so they are there as long as it goes on.
 class RestartSettingsFile final {

@@ -1,8 +1,10 @@
 #include "run/results/result_file.h"
 
 #include <algorithm>
+#include <filesystem>
 #include <iterator>
 #include <optional>
+#include <system_error>
 #include <utility>
 
 #include <fmt/core.h>
@@ -33,12 +35,12 @@ std::string commentLines(std::span<const std::string> texts) {
 }  // namespace
 
 void ResultFile::open(const std::string& path, std::span<const std::string> headLines, const ResultColumns& columns,
-                      std::span<const ResultRow> earlierRows) {
+                      const ResultRows& earlierRows) {
   rows_.clear();
   earlierAggregates_.clear();
   aggregates_.clear();
   columns_ = columns;
-  columns_.hasRepeats = !earlierRows.empty() && earlierRows.front().repeats.has_value();
+  columns_.hasRepeats = !earlierRows.empty() && earlierRows.repeats(0).has_value();
   std::string content = commentLines(headLines) + resultHeader(columns_) + '\n';
   headLength_ = std::ssize(content);
   if (earlierRows.empty()) {
@@ -47,18 +49,24 @@ void ResultFile::open(const std::string& path, std::span<const std::string> head
     file_.append(content);
     return;
   }
-  std::vector<RowChecksum> checksums;
+  std::error_code failed;
+  const std::uintmax_t size = std::filesystem::file_size(path, failed);
+  if (!failed) content.reserve(content.size() + size);  // about as long as that of the earlier run
+  rows_.reserve(earlierRows.size());
+  earlierAggregates_.reserve(earlierRows.size());
   for (const ResultRow& row : earlierRows) {
     const std::string line = resultRowText(row);
-    rows_.push_back(
-        {row.number, row.repeats.value_or(0) > 0, std::ssize(content), std::ssize(line) + 1, checksumOf(line)});
-    checksums.push_back({row.number, rows_.back().checksum});
-    earlierAggregates_[row.number] = row.aggregate;
-    content += line + '\n';
+    addPlace(row, std::ssize(content), line);
+    earlierAggregates_.emplace_back(row.number, row.aggregate);
+    content += line;
+    content += '\n';
   }
+  std::sort(earlierAggregates_.begin(), earlierAggregates_.end());
+  const std::vector<RowChecksum> checksums = checksumsOfRows();
   checksums_.complete(checksums);
   std::string reason;
   if (!replaceFile(path, content, reason)) fatalError("Error: Unable to write to " + path, reason);
+  content = {};
   checksums_.open(checksums);  // only now those of rows that are not taken up are superfluous
   file_.openToContinue(path);
 }
@@ -67,11 +75,13 @@ void ResultFile::addRow(ResultRow row) {
   if (row.repeats && !columns_.hasRepeats) addRepeatsColumn();
   if (columns_.hasRepeats && !row.repeats) row.repeats = 0;
   const std::string line = resultRowText(row);
-  const std::uint64_t checksum = checksumOf(line);
-  checksums_.add({row.number, checksum});  // before the row, which would be taken for damaged without it
-  if (!file_.append(line + '\n')) return;
-  const std::int64_t length = std::ssize(line) + 1;
-  rows_.push_back({row.number, row.repeats.value_or(0) > 0, file_.size() - length, length, checksum});
+  checksums_.add({row.number, checksumOf(line)});  // before the row, which would be taken for damaged without it
+  if (file_.append(line + '\n')) addPlace(row, file_.size() - std::ssize(line) - 1, line);
+}
+
+void ResultFile::addPlace(const ResultRow& row, std::int64_t offset, std::string_view line) {
+  rows_.push_back(
+      {offset, checksumOf(line), row.number, static_cast<std::uint32_t>(line.size() + 1), row.repeats.value_or(0) > 0});
 }
 
 /// Rows are nearly in the order of their numbers.
@@ -121,7 +131,8 @@ void ResultFile::addRepeatsColumn() {
     const auto line = std::string_view(*content).substr(static_cast<std::size_t>(place.offset),
                                                         static_cast<std::size_t>(place.length) - 1);
     const std::string widened = std::string(line) + "\t0";
-    places.push_back({place.number, false, std::ssize(text), std::ssize(widened) + 1, checksumOf(widened)});
+    places.push_back(
+        {std::ssize(text), checksumOf(widened), place.number, static_cast<std::uint32_t>(widened.size() + 1), false});
     after.push_back({place.number, places.back().checksum});
     text += widened + '\n';
   }
@@ -141,8 +152,9 @@ void ResultFile::addRepeatsColumn() {
 }
 
 void ResultFile::replaceAggregate(int number, double aggregate) {
-  const auto earlier = earlierAggregates_.find(number);
-  if (earlier != earlierAggregates_.end() && earlier->second == aggregate) {
+  const auto earlier = std::lower_bound(earlierAggregates_.begin(), earlierAggregates_.end(), number,
+                                        [](const auto& entry, int wanted) { return entry.first < wanted; });
+  if (earlier != earlierAggregates_.end() && earlier->first == number && earlier->second == aggregate) {
     aggregates_.erase(number);
   } else {
     aggregates_[number] = aggregate;
@@ -179,7 +191,7 @@ bool ResultFile::hasRowsAsWritten(std::string_view content, std::string& reason)
   for (const Place& place : rows_) {
     const std::string_view line = content.substr(std::min(content.size(), static_cast<std::size_t>(place.offset)),
                                                  static_cast<std::size_t>(place.length));
-    if (std::ssize(line) == place.length && line.back() == '\n' &&
+    if (line.size() == place.length && line.back() == '\n' &&
         checksumOf(line.substr(0, line.size() - 1)) == place.checksum) {
       continue;
     }

@@ -10,7 +10,7 @@
 #include <vector>
 
 #include "run/results/record_file.h"
-#include "run/results/result_row.h"
+#include "run/results/result_rows.h"
 #include "run/results/row_checksums.h"
 
 namespace mirevo {
@@ -27,7 +27,7 @@ class ResultFile final {
   /// Creates the file with its head lines (without "# "), its header row and the rows of an earlier run, and replaces
   /// the earlier file with it, so that no row is ever missing from disk. Throws FatalError.
   void open(const std::string& path, std::span<const std::string> headLines, const ResultColumns& columns,
-            std::span<const ResultRow> earlierRows = {});
+            const ResultRows& earlierRows = {});
 
   /// Writes one evaluation. The first one that repeats another gives the file the column that says so: the file is
   /// replaced with one that has it. Throws FatalError when that fails.
@@ -54,12 +54,13 @@ class ResultFile final {
  private:
   /// Where a row is in the file, in bytes.
   struct Place {
-    int number;
-    bool isRepeat;
     std::int64_t offset;
-    std::int64_t length;
     std::uint64_t checksum;
+    int number;
+    std::uint32_t length;
+    bool isRepeat;
   };
+  void addPlace(const ResultRow& row, std::int64_t offset, std::string_view line);
   bool isInOrder() const;
   const Place* placeOf(int number) const;
   void addRepeatsColumn();
@@ -75,8 +76,8 @@ class ResultFile final {
   ResultColumns columns_;
   std::int64_t headLength_ = 0;
   std::vector<Place> rows_;
-  std::map<int, double> earlierAggregates_;  ///< of the rows of an earlier run, by number
-  std::map<int, double> aggregates_;         ///< those that are to be changed, by number
+  std::vector<std::pair<int, double>> earlierAggregates_;  ///< of the rows of an earlier run, by number
+  std::map<int, double> aggregates_;                       ///< those that are to be changed, by number
 };
 
 }  // namespace mirevo

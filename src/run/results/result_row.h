@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <optional>
 #include <span>
 #include <string>
@@ -34,7 +35,8 @@ struct ResultRow {
   /// The number of the evaluation of the same set whose result this one has, without a model run of its own; 0 for one
   /// that had its own. Empty in a file without the column, where no evaluation repeats another.
   std::optional<int> repeats = {};
-  std::size_t line = 0;  ///< of a row that was read: the line of its file, from 1
+  std::size_t line = 0;            ///< of a row that was read: the line of its file, from 1
+  std::uint64_t lineChecksum = 0;  ///< likewise: checksumOf() the line
 };
 
 /// The columns for a setup.
@@ -58,5 +60,7 @@ ResultColumns withRepeatsOf(std::string_view header, ResultColumns columns);
 bool hasColumns(std::string_view header, const ResultColumns& columns);
 /// The row in a line below a header row with these columns; empty for a line that is not a row.
 std::optional<ResultRow> readResultRow(std::string_view line, const ResultColumns& columns);
+/// The same into `row`, whose memory is used again; false for a line that is not a row.
+bool readResultRow(std::string_view line, const ResultColumns& columns, ResultRow& row);
 
 }  // namespace mirevo

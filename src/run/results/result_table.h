@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "run/results/result_row.h"
+#include "run/results/result_rows.h"
 
 namespace mirevo {
 
@@ -28,6 +29,8 @@ struct ResultTable {
 /// counts as cut off even if it can be read, since digits of its last number may be missing. Accepts any text; lines
 /// that do not belong in a result file count as unusable.
 ResultTable readResultTable(std::string_view text, const ResultColumns& expected);
+/// The same with the rows in `rows`, for those who read many.
+ResultTable readResultTable(std::string_view text, const ResultColumns& expected, ResultRows& rows);
 
 /// Sorts the rows by number; of several with the same number the first is kept.
 void putInOrder(std::vector<ResultRow>& rows);

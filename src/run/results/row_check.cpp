@@ -3,6 +3,9 @@
 #include <algorithm>
 #include <cmath>
 #include <map>
+#include <optional>
+#include <utility>
+#include <vector>
 
 #include <fmt/core.h>
 
@@ -111,23 +114,46 @@ enum class ChecksumState { right, wrong, none };
 
 /// By the row's numbers and not by its line, whose ends another program may have changed.
 ChecksumState stateOf(const ResultRow& row, const RowChecksums& checksums) {
-  const auto [begin, end] = checksums.equal_range(row.number);
-  if (begin == end) return ChecksumState::none;
-  const std::uint64_t found = checksumOf(resultRowText(row));
-  const bool isRight = std::any_of(begin, end, [found](const auto& entry) { return entry.second == found; });
+  if (!checksums.has(row.number)) return ChecksumState::none;
+  // Of a line that nobody has touched there is no need to write it again.
+  const bool isRight =
+      checksums.has({row.number, row.lineChecksum}) || checksums.has({row.number, checksumOf(resultRowText(row))});
   return isRight ? ChecksumState::right : ChecksumState::wrong;
 }
 
+/// The lines of rows by their numbers, which nearly always rise.
+class LinesByNumber final {
+ public:
+  void add(int number, std::size_t line) {
+    if (rising_.empty() || rising_.back().first < number) {
+      rising_.emplace_back(number, line);
+    } else {
+      others_.emplace(number, line);
+    }
+  }
+  /// Empty for a number that no row has.
+  std::optional<std::size_t> lineOf(int number) const {
+    if (const auto other = others_.find(number); other != others_.end()) return other->second;
+    if (rising_.empty() || rising_.back().first < number) return std::nullopt;
+    const auto found = std::lower_bound(rising_.begin(), rising_.end(), std::pair(number, std::size_t{0}));
+    return found->first == number ? std::optional(found->second) : std::nullopt;
+  }
+
+ private:
+  std::vector<std::pair<int, std::size_t>> rising_;
+  std::map<int, std::size_t> others_;
+};
+
 }  // namespace
 
-CheckedRows checkRows(std::span<const ResultRow> rows, const RowChecksums& checksums, const RunConfig& config,
+CheckedRows checkRows(const ResultRows& rows, const RowChecksums& checksums, const RunConfig& config,
                       RowOrigin origin) {
   CheckedRows checked;
   const RowArithmetic arithmetic(config);
   const int planned = config.plannedModelRuns();
-  const auto hasChecksum = [&checksums](const ResultRow& row) { return checksums.count(row.number) > 0; };
-  const auto lastWithChecksum = std::find_if(rows.rbegin(), rows.rend(), hasChecksum).base();
-  std::map<int, std::size_t> lines;  // of rows that hold, by number
+  std::size_t withChecksum = rows.size();  // up to the last row that has one
+  while (withChecksum > 0 && !checksums.has(rows.number(withChecksum - 1))) --withChecksum;
+  LinesByNumber lines;  // of rows that hold
   const auto faultOf = [&](const ResultRow& row, bool isBeforeChecksums) -> std::string {
     const ChecksumState state = stateOf(row, checksums);
     if (state == ChecksumState::wrong) return "it is not as it was written: it has another checksum";
@@ -135,9 +161,7 @@ CheckedRows checkRows(std::span<const ResultRow> rows, const RowChecksums& check
       if (isBeforeChecksums) return "it has no checksum, though rows below it have one";
       ++checked.withoutChecksum;
     }
-    if (const auto other = lines.find(row.number); other != lines.end()) {
-      return fmt::format("the evaluation is in line {}, too", other->second);
-    }
+    if (const auto other = lines.lineOf(row.number)) return fmt::format("the evaluation is in line {}, too", *other);
     if (origin == RowOrigin::perhapsOther && state == ChecksumState::right) return {};
     if (row.number > planned) return fmt::format("the run has at most {} evaluations", planned);
     // A model may write this number, but without a checksum the status may have been edited as well.
@@ -145,11 +169,12 @@ CheckedRows checkRows(std::span<const ResultRow> rows, const RowChecksums& check
         row.ok && state == ChecksumState::none && !row.measures.empty() && allResults(row, isFailedValue);
     return isOfFailed ? "its status is OK, but its values are those of a failed evaluation" : arithmetic.faultOf(row);
   };
-  for (auto row = rows.begin(); row != rows.end(); ++row) {
-    if (std::string what = faultOf(*row, row < lastWithChecksum); !what.empty()) {
-      checked.faults.push_back({row->line, row->number, std::move(what)});
+  std::size_t index = 0;
+  for (const ResultRow& row : rows) {
+    if (std::string what = faultOf(row, index++ < withChecksum); !what.empty()) {
+      checked.faults.push_back({row.line, row.number, std::move(what)});
     } else {
-      lines.emplace(row->number, row->line);
+      lines.add(row.number, row.line);
     }
   }
   return checked;

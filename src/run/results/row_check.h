@@ -1,11 +1,10 @@
 #pragma once
 
 #include <cstddef>
-#include <span>
 #include <string>
 #include <vector>
 
-#include "run/results/result_row.h"
+#include "run/results/result_rows.h"
 #include "run/results/row_checksums.h"
 #include "run/setup/run_config.h"
 
@@ -35,8 +34,7 @@ enum class RowOrigin {
 /// a failed evaluation those of a failed one, and whether a number occurs twice or is beyond the plan of the run.
 /// Aggregates whose scale comes from the sample of the run are checked by their checksums alone: as long as the run
 /// goes on they may be NaN.
-CheckedRows checkRows(std::span<const ResultRow> rows, const RowChecksums& checksums, const RunConfig& config,
-                      RowOrigin origin);
+CheckedRows checkRows(const ResultRows& rows, const RowChecksums& checksums, const RunConfig& config, RowOrigin origin);
 
 /// "line 14 (evaluation No. 5): it has ..."
 std::string rowFaultText(const RowFault& fault);

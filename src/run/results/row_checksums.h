@@ -1,7 +1,7 @@
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
-#include <map>
 #include <span>
 #include <string>
 #include <string_view>
@@ -18,7 +18,25 @@ struct RowChecksum {
 };
 
 /// Checksums by the number of their evaluation, which may have several: its row had each of them at some time.
-using RowChecksums = std::multimap<int, std::uint64_t>;
+class RowChecksums final {
+ public:
+  RowChecksums() = default;
+  /// In any order.
+  explicit RowChecksums(std::vector<RowChecksum> rows);
+
+  bool empty() const { return rows_.empty(); }
+  std::size_t size() const { return rows_.size(); }
+  bool has(int number) const { return !of(number).empty(); }
+  bool has(const RowChecksum& row) const;
+  /// Those of an evaluation.
+  std::span<const RowChecksum> of(int number) const;
+  /// By their numbers, those of an evaluation in the order in which they were given.
+  auto begin() const { return rows_.begin(); }
+  auto end() const { return rows_.end(); }
+
+ private:
+  std::vector<RowChecksum> rows_;  ///< by their numbers
+};
 
 /// The checksums of a result file's rows, `<setup>_Checksums.dat` and its like, which tell whether a row is as it was
 /// written. One is written before its row, so that a kill or a full disk between the two leaves a checksum without a

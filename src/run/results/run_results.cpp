@@ -243,19 +243,17 @@ void RunResults::removeStatistics(const RunConfig& config) const {
 }
 
 /// Further runs must not be judged by another run than those before: the first successful one is repeated if its pairs
-/// are lost.
-void RunResults::restorePairs(const RunConfig& config, std::span<const ResultRow> rows, EarlierPairs& earlier,
-                              std::map<int, EarlierEvaluations::Record>& records, RunLog& log) const {
+/// are lost. Returns its number then, and otherwise 0.
+int RunResults::restorePairs(const RunConfig& config, const ResultRows& rows, EarlierPairs& earlier,
+                             RunLog& log) const {
   const std::size_t count = pairedCount(measureSources(config.measures, config.measureFile, config.baseFolder));
   const int first = firstWithoutPairs(rows, earlier.pairs, count);
   std::erase_if(earlier.pairs, [&](const auto& entry) {
-    const auto record = records.find(entry.first);
-    return record == records.end() || !record->second.result.ok() || entry.first == first;
+    const std::size_t index = rows.find(entry.first);
+    return index == rows.size() || !rows.isOk(index) || entry.first == first;
   });
   constexpr const char* kKnown = "is known only as far as the file still says";
   if (first != 0) {
-    records.at(first).repeatsRun = true;
-    records.at(first).result.pairs.clear();
     log.warning(
         fmt::format("{} does not have the pairs of evaluation No. {}, the first successful run, with which others are "
                     "compared: its "
@@ -267,30 +265,36 @@ void RunResults::restorePairs(const RunConfig& config, std::span<const ResultRow
         "successful run {}",
         pairs_.path(), earlier.lostRows, kKnown));
   }
+  return first;
 }
 
 void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggregator, RunLog& log) {
   EarlierRun run = *std::exchange(earlierRun_, std::nullopt);
-  std::vector<std::string> beside = pathsBesideResults();
-  beside.push_back(failedRuns_.paths().forPeople);
-  keepResultsOfAnother(files_.results, beside, config.setupFile, log);
+  std::vector<std::string> paths = pathsBesideResults();
+  paths.push_back(failedRuns_.paths().forPeople);
+  keepResultsOfAnother(files_.results, paths, config.setupFile, log);
   if (earlierRunHasStatistics_) removeStatistics(config);
   std::map<int, std::vector<double>> failedSets;
   std::set<int> failed;
-  std::set<int> succeeded;
-  for (const ResultRow& row : run.rows) {
-    (row.ok ? succeeded : failed).insert(row.number);
-    if (!row.ok) failedSets[row.number] = row.parameters;
+  for (std::size_t i = 0; i < run.rows.size(); ++i) {
+    if (run.rows.isOk(i)) continue;
+    failed.insert(run.rows.number(i));
+    failedSets[run.rows.number(i)] = run.rows[i].parameters;
   }
+  const std::size_t succeeded = run.rows.size() - failed.size();
   const FailedRunFile::Earlier earlier = failedRuns_.readEarlier(failed);
-  std::map<int, EvaluationFailure> failures;
-  for (const FailureRow& row : earlier.rows) failures[row.number] = row.failure;
-  std::optional<std::map<int, KeptValues>> values;
-  if (simulatedValues_) values = simulatedValues_->takeUp(run.rows);
-  const std::size_t withoutValues = values ? succeeded.size() - values->size() : 0;
+  BesideRows beside;
+  for (const FailureRow& row : earlier.rows) beside.failures[row.number] = row.failure;
+  std::size_t withoutValues = 0;
+  if (simulatedValues_) {
+    beside.keptValues = simulatedValues_->takeUp(run.rows);
+    withoutValues = succeeded - beside.keptValues.size();
+    // Evaluations without them are repeated.
+    run.rows.keepIf([&](std::size_t i) { return !run.rows.isOk(i) || beside.keptValues.contains(run.rows.number(i)); });
+  }
   EarlierPairs earlierPairs = pairs_.readEarlier();
-  auto records = earlierRecords(run, failures, earlierPairs.pairs, std::move(values));
-  restorePairs(config, run.rows, earlierPairs, records, log);
+  const int repeated = restorePairs(config, run.rows, earlierPairs, log);
+  beside.pairs = earlierPairs.pairs;
 
   RunRecord record = recordOf(config, log);
   record.started = run.started;
@@ -316,20 +320,24 @@ void RunResults::goOn(const RunConfig& config, const ObjectiveAggregator& aggreg
         "as one of an earlier version, not with all digits",
         withoutValues, files_.simulatedValues));
   }
-  log.line(fmt::format("Restart: {} evaluations are taken from {}", records.size(), files_.results));
+  log.line(fmt::format("Restart: {} evaluations are taken from {}", run.rows.size(), files_.results));
   std::set<std::string> names;
   for (const SavedOutputFile& file : config.savedOutputFiles) {
     names.emplace(trimTrailing(file.fileName).substr(config.baseFolder.size()));
   }
-  std::erase_if(succeeded, [&records](int number) { return !records.contains(number); });
-  std::set<int> again = unkeptFiles_.goOn(succeeded, names);
+  const auto hasSucceeded = [&run](int number) {
+    const std::size_t index = run.rows.find(number);
+    return index < run.rows.size() && run.rows.isOk(index);
+  };
+  std::set<int> again = unkeptFiles_.goOn(hasSucceeded, names);
   if (!again.empty()) {
     log.line(
         fmt::format("Restart: model runs that are made again for output files that could not be kept, see {}: {}; the "
                     "results stay as they are",
                     fileNameOf(files_.unkept), again.size()));
   }
-  earlierEvaluations_.emplace(space_, aggregator, std::move(records));
+  earlierEvaluations_.emplace(space_, aggregator, earlierRecords(std::move(run.rows), std::move(beside)));
+  if (repeated != 0) earlierEvaluations_->repeatRun(repeated);
   earlierEvaluations_->runAgain(std::move(again));
 }
 

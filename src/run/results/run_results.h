@@ -81,8 +81,7 @@ class RunResults final {
   std::vector<std::string> earlierBands(RunLog& log) const;
   /// Those of an unfinished run do not count any more when it goes on, and can be computed again.
   void removeStatistics(const RunConfig& config) const;
-  void restorePairs(const RunConfig& config, std::span<const ResultRow> rows, EarlierPairs& earlier,
-                    std::map<int, EarlierEvaluations::Record>& records, RunLog& log) const;
+  int restorePairs(const RunConfig& config, const ResultRows& rows, EarlierPairs& earlier, RunLog& log) const;
   void goOn(const RunConfig& config, const ObjectiveAggregator& aggregator, RunLog& log);
 
   SearchSpace space_;

@@ -5,6 +5,8 @@
 #include <cstddef>
 #include <cstdint>
 #include <cstring>
+#include <limits>
+#include <optional>
 #include <string_view>
 #include <utility>
 
@@ -54,6 +56,13 @@ std::uint64_t checksumWithRow(std::string_view content, std::span<const double> 
     bytes.append(reinterpret_cast<const char*>(values.data()), values.size_bytes());
   }
   return checksumOf(bytes);
+}
+
+/// The row of a successful evaluation; empty for another number.
+std::optional<ResultRow> succeeded(const ResultRows& rows, std::int64_t number) {
+  if (number < 1 || number > std::numeric_limits<int>::max()) return std::nullopt;
+  const std::size_t index = rows.find(static_cast<int>(number));
+  return index < rows.size() && rows.isOk(index) ? std::optional(rows[index]) : std::nullopt;
 }
 
 }  // namespace
@@ -108,7 +117,7 @@ void SimulatedValuesFile::add(std::span<const double> parameterValues, const Eva
 }
 
 /// Replaces a file of an earlier version, whose checksums do not depend on the rows.
-void SimulatedValuesFile::addRowsToChecksums(const std::map<std::int64_t, const ResultRow*>& rows) const {
+void SimulatedValuesFile::addRowsToChecksums(const ResultRows& rows) const {
   if (timesChecksum_) return;  // earlier versions had no such files
   const std::string earlierHead = headOf(kMarksWithoutRow, precision_, recordedCount());
   if (readFileIfThere(path_, earlierHead.size()) != earlierHead) return;
@@ -117,21 +126,17 @@ void SimulatedValuesFile::addRowsToChecksums(const std::map<std::int64_t, const 
   std::string_view rest = std::string_view(content).substr(earlierHead.size());
   for (; rest.size() >= recordLength(); rest.remove_prefix(recordLength())) {
     const std::string_view record = rest.substr(0, contentLength());
-    const auto row = rows.find(numberAt<std::int64_t>(record, 0));
-    if (row == rows.end() || checksumOf(record) != numberAt<std::uint64_t>(rest, contentLength())) continue;
+    const auto row = succeeded(rows, numberAt<std::int64_t>(record, 0));
+    if (!row || checksumOf(record) != numberAt<std::uint64_t>(rest, contentLength())) continue;
     bytes += record;
-    appendBytes(bytes, checksumWithRow(record, row->second->parameters, row->second->measures));
+    appendBytes(bytes, checksumWithRow(record, row->parameters, row->measures));
   }
   std::string reason;
   if (!replaceFile(path_, bytes, reason)) fatalError("Error: Unable to write to " + path_, reason);
 }
 
-std::map<int, KeptValues> SimulatedValuesFile::takeUp(std::span<const ResultRow> rows) {
-  std::map<std::int64_t, const ResultRow*> succeeded;
-  for (const ResultRow& row : rows) {
-    if (row.ok) succeeded.emplace(row.number, &row);
-  }
-  addRowsToChecksums(succeeded);
+std::map<int, KeptValues> SimulatedValuesFile::takeUp(const ResultRows& rows) {
+  addRowsToChecksums(rows);
   const std::string expected = head();
   if (readFileIfThere(path_, expected.size()) != expected) {
     create();
@@ -146,12 +151,12 @@ std::map<int, KeptValues> SimulatedValuesFile::takeUp(std::span<const ResultRow>
   for (; offset + length <= file_.size(); offset += length) {
     read(offset, record.data(), record.size());
     const std::string_view content = std::string_view(record).substr(0, contentLength());
-    const auto row = succeeded.find(numberAt<std::int64_t>(record, 0));
-    if (row == succeeded.end() || checksumWithRow(content, row->second->parameters, row->second->measures) !=
-                                      numberAt<std::uint64_t>(record, contentLength())) {
+    const auto row = succeeded(rows, numberAt<std::int64_t>(record, 0));
+    if (!row ||
+        checksumWithRow(content, row->parameters, row->measures) != numberAt<std::uint64_t>(record, contentLength())) {
       continue;
     }
-    const int number = row->second->number;
+    const int number = row->number;
     KeptValues values{std::vector<double>(valueCount_), std::vector<double>(exactMeasureCount_)};
     const char* from = record.data() + sizeof(std::int64_t);
     for (std::vector<double>* const part : {&values.simulatedValues, &values.exactMeasures}) {

@@ -11,7 +11,7 @@
 #include "evaluation/evaluation_result.h"
 #include "measures/observed_series.h"
 #include "run/results/record_file.h"
-#include "run/results/result_row.h"
+#include "run/results/result_rows.h"
 
 namespace mirevo {
 
@@ -44,7 +44,7 @@ class SimulatedValuesFile final {
   /// damaged or of other evaluations, perhaps of another run, are passed over, one that is cut off is removed, and so
   /// are all of a file of another precision or of other times. Throws FatalError when the file cannot be read or
   /// written.
-  std::map<int, KeptValues> takeUp(std::span<const ResultRow> rows);
+  std::map<int, KeptValues> takeUp(const ResultRows& rows);
 
   /// Writes the values of a successful evaluation; `parameterValues` as in its row. Throws FatalError when that fails.
   void add(std::span<const double> parameterValues, const EvaluationResult& result);
@@ -67,7 +67,7 @@ class SimulatedValuesFile final {
   std::size_t recordedCount() const { return valueCount_ + exactMeasureCount_; }
   std::size_t contentLength() const { return sizeof(std::int64_t) + recordedCount() * sizeof(double); }
   std::size_t recordLength() const { return contentLength() + sizeof(std::uint64_t); }
-  void addRowsToChecksums(const std::map<std::int64_t, const ResultRow*>& rows) const;
+  void addRowsToChecksums(const ResultRows& rows) const;
   void read(std::int64_t offset, char* bytes, std::size_t size) const;
   void noteOffset(int number, std::int64_t offset);
   std::int64_t offsetOf(int number) const;

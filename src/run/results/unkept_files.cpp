@@ -52,14 +52,14 @@ std::string unkeptTableText(std::span<const std::string> head, const UnkeptByNum
 UnkeptFiles::UnkeptFiles(std::string path, std::vector<std::string> tableHead)
     : path_(std::move(path)), tableHead_(std::move(tableHead)) {}
 
-std::set<int> UnkeptFiles::goOn(const std::set<int>& numbers, const std::set<std::string>& names) {
+std::set<int> UnkeptFiles::goOn(const std::function<bool(int)>& hasSucceeded, const std::set<std::string>& names) {
   const auto present = readFileIfThere(path_);
   if (!present) return {};
   files_ = readUnkeptTable(*present);
   for (auto& [number, files] : files_) {
     std::erase_if(files, [&](const UnkeptFile& file) { return !names.contains(file.name); });
   }
-  std::erase_if(files_, [&](const auto& entry) { return !numbers.contains(entry.first) || entry.second.empty(); });
+  std::erase_if(files_, [&](const auto& entry) { return !hasSucceeded(entry.first) || entry.second.empty(); });
   file_.openToContinue(path_, unkeptTableText(tableHead_, files_));
   std::set<int> found;
   for (const auto& [number, files] : files_) found.insert(number);

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <functional>
 #include <map>
 #include <set>
 #include <span>
@@ -22,9 +23,10 @@ class UnkeptFiles final {
   /// `tableHead` is over the table, for people.
   UnkeptFiles(std::string path, std::vector<std::string> tableHead);
 
-  /// Continues what an interrupted run has left: the files of the evaluations with those numbers that are still to be
-  /// kept, `names` below the base folder. Returns the numbers of the evaluations. Throws FatalError.
-  std::set<int> goOn(const std::set<int>& numbers, const std::set<std::string>& names);
+  /// Continues what an interrupted run has left: the files of the evaluations that have succeeded, as the condition
+  /// says of a number, that are still to be kept, `names` below the base folder. Returns the numbers of the
+  /// evaluations. Throws FatalError.
+  std::set<int> goOn(const std::function<bool(int)>& hasSucceeded, const std::set<std::string>& names);
   /// Notes those of an evaluation; none if it has been made again and has all. Throws FatalError when they cannot be
   /// written.
   void add(int number, std::span<const UnkeptFile> files);

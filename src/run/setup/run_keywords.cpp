@@ -74,7 +74,7 @@ const SettingSection<RunConfig>& simulationOptionSection() {
             {.name = "Report",
              .defaultValue = "1",
              .meaning = "1: a report for the browser is written at the end of the run, as `<setup>_Report.html`. 0: "
-                        "none.",
+                        "none, and no series are kept for one.",
              .bearsOnResults = kNotOfResults})}}};
   return section;
 }

@@ -189,7 +189,7 @@ std::vector<ParameterSet> UncertaintyTask::drawSample(const TaskContext& context
 
 TaskOutcome UncertaintyTask::outcomeOf(const TaskContext& context, const UncertaintyOutcome& found) const {
   TaskOutcome outcome{std::string(kEndOfTask)};
-  const UncertaintySummary summary = summariseUncertainty(found, context.space);
+  const UncertaintySummary summary = summariseUncertainty(found, context.space, settings.matrixLimit);
   const AnalysisNames names = analysisNames(context);
   outcome.report =
       formatUncertainty(summary, names, fileNameOf(runFilePath(context.filePrefix, run_files::kSampleCorrelation)));

@@ -34,6 +34,12 @@ TEST(SampleSummary, SaysNaNWhereTheSampleIsTooSmall) {
   EXPECT_TRUE(std::isnan(one.standardDeviation));
 }
 
+std::vector<double> column(const std::vector<std::vector<double>>& rows, std::size_t j) {
+  std::vector<double> values;
+  for (const auto& row : rows) values.push_back(row[j]);
+  return values;
+}
+
 TEST(SampleCorrelation, MatchesAWorkedExampleAndRefusesConstants) {
   const std::vector<std::vector<double>> rows = {{1, 2, 7}, {2, 1, 7}, {3, 4, 7}, {4, 3, 7}};
   const auto matrix = correlationMatrix(rows);
@@ -41,6 +47,33 @@ TEST(SampleCorrelation, MatchesAWorkedExampleAndRefusesConstants) {
   EXPECT_EQ(matrix[1][0], matrix[0][1]);
   EXPECT_TRUE(std::isnan(matrix[0][2]));
   EXPECT_EQ(matrix[2][2], 1.0);
+}
+
+TEST(SampleCorrelation, TheLargestOfManyAreThoseOfTheMatrix) {
+  std::vector<std::vector<double>> rows(7, std::vector<double>(30));
+  std::uint32_t state = 1;
+  for (auto& row : rows) {
+    for (double& value : row) value = (state = state * 1664525U + 1013904223U) >> 8U;
+    row[3] = 5.0;          // without variance
+    row[9] = -2 * row[4];  // two with the same absolute value
+    row[8] = row[4];
+  }
+  const auto matrix = correlationMatrix(rows);
+  std::vector<PairCorrelation> all;
+  for (std::size_t i = 0; i < 30; ++i) {
+    for (std::size_t j = i + 1; j < 30; ++j) {
+      if (!std::isnan(matrix[i][j])) all.push_back({i, j, matrix[i][j]});
+    }
+  }
+  std::ranges::stable_sort(all, [](auto& a, auto& b) { return std::abs(a.value) > std::abs(b.value); });
+  for (const std::size_t count : {0, 1, 2, 50, 1000}) {
+    const auto largest = largestCorrelations(SampleCorrelations(rows), count);
+    ASSERT_EQ(largest.size(), std::min(count, all.size()));
+    for (std::size_t k = 0; k < largest.size(); ++k) {
+      EXPECT_EQ(std::pair(largest[k].first, largest[k].second), std::pair(all[k].first, all[k].second)) << k;
+      EXPECT_EQ(largest[k].value, sampleCorrelation(column(rows, largest[k].second), column(rows, largest[k].first)));
+    }
+  }
 }
 
 TEST(SampleCorrelation, OfMoreThanTenColumnsIsToldByItsLargestPairs) {

@@ -4,12 +4,16 @@
 #include <array>
 #include <csignal>
 #include <fcntl.h>
+#include <filesystem>
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <fmt/format.h>
 #include <gtest/gtest.h>
 
+#include "common/progress_messages.h"
 #include "temporary_folder.h"
+#include "viewer/message_file.h"
 
 namespace mirevo {
 namespace {
@@ -61,6 +65,62 @@ TEST_F(ProgressReporterTest, StandardOutputTakesMessagesAloneAndNoneTakesNothing
                                                               "7\n Evaluation of parameter set No. 1 initiated\n"
                                                             : "");
     EXPECT_FALSE(folder_.exists("basin._spi_"));
+  }
+}
+
+/// A viewer that looks now and then must know as much as one that has seen every record.
+TEST_F(ProgressReporterTest, AMessageFileThatIsBegunAnewTellsAViewerTheSame) {
+  constexpr std::uintmax_t kMostBytes = 200'000;  // a whole file would have twice as much
+  ProgressReporter reporter([this] { return now_; }, kMostBytes);
+  init(reporter);
+  ProgressRecords all;
+  reporter.passRecordsTo([&all](std::string_view record) { all.feed(record, 0.0); });
+  MessageFile file(folder_ / "basin._spi_");
+  ProgressRecords seen;
+  reporter.progressStart("2026-11-21 04:10:09 +0100", "host", 7);
+  reporter.writeMessage("Title: T");
+  reporter.writeStatus("Parameter optimisation");
+  reporter.progressEvaluationLabel(4000);
+  std::uintmax_t longest = 0;
+  for (int number = 1; number <= 3000; ++number) {
+    const bool isReplayed = number <= 1000;
+    if (isReplayed) {
+      reporter.progressReplayed(number, number % 200 != 0);
+    } else {
+      reporter.writeMessage(progress::completedMessage(number, number % 200 == 0 ? "FAILED - x" : "OK"));
+    }
+    if (number % 3 == 0) reporter.progressBest(number, 1.0 / number, "");
+    if (number % 500 == 0) reporter.writeMessage(fmt::format("Warning: {}", number));
+    now_ += 1.0;
+    if (!isReplayed) reporter.progressStep();
+    longest = std::max(longest, std::filesystem::file_size(folder_ / "basin._spi_"));
+    while (number % 70 == 0 && file.readPiece(seen)) {
+    }
+  }
+  reporter.progressEnd("Normal termination");
+  EXPECT_LT(longest, kMostBytes + 5000);
+  MessageFile late(folder_ / "basin._spi_");
+  ProgressRecords latest;
+  while (file.readPiece(seen) || late.readPiece(latest)) {
+  }
+  for (const ProgressRecords* const viewer : {&seen, &latest}) {
+    const ProgressState& state = viewer->state();
+    EXPECT_EQ(state.done, 3000);
+    EXPECT_EQ(state.failed, 15);
+    EXPECT_EQ(state.title, "T");
+    EXPECT_EQ(state.ending, "Normal termination");
+    EXPECT_EQ(state.origin.process, 7);
+    EXPECT_EQ(state.planned, 4000);
+    EXPECT_EQ(state.perSecond, all.state().perSecond);
+    EXPECT_EQ(state.best->evaluation, 3000);
+    EXPECT_EQ(state.best->aggregate, all.state().best->aggregate);
+    EXPECT_EQ(state.notices.size(), all.state().notices.size());
+    EXPECT_EQ(state.notices.back(), all.state().notices.back());
+    for (const ProgressState::CoursePoint& point : state.course) {
+      EXPECT_EQ(point.aggregate, 1.0 / static_cast<double>(point.evaluations));
+    }
+    EXPECT_GT(state.course.size(), 100U);
+    EXPECT_EQ(state.course.front().evaluations, 3);
   }
 }
 
