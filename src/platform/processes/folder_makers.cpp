@@ -8,6 +8,7 @@
 #include <cstring>
 #include <exception>
 #include <fcntl.h>
+#include <memory>
 #include <new>
 #include <optional>
 #include <poll.h>
@@ -60,7 +61,7 @@ class SharedMemory final {
   SharedMemory()
       : memory_(::mmap(nullptr, sizeof(SharedState), PROT_READ | PROT_WRITE, MAP_SHARED | MAP_ANONYMOUS, -1, 0)) {
     if (memory_ == MAP_FAILED) throw std::bad_alloc();
-    state_ = new (memory_) SharedState;
+    state_ = std::construct_at(static_cast<SharedState*>(memory_));
   }
   ~SharedMemory() { ::munmap(memory_, sizeof(SharedState)); }
   SharedMemory(const SharedMemory&) = delete;

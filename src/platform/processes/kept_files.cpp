@@ -157,7 +157,8 @@ class Reduction final {
       if (!names) continue;
       for (const std::string& name : *names) {
         if (below.empty() && name == run_files::kFolderMark) continue;
-        reduceEntry(below + "/" + name);
+        std::string path = below;
+        reduceEntry(path.append("/").append(name));
       }
     }
     return std::move(remaining_);
