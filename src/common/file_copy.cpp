@@ -18,7 +18,7 @@
 namespace mirevo {
 namespace {
 
-constexpr std::uint64_t kCopyChunk = std::uint64_t{1} << 30;
+constexpr std::uint64_t kCopyChunk = std::uint64_t{1} << 24;  // a sixth of a second on a disk of 100 MB/s
 constexpr off_t kStatBlock = 512;
 constexpr off_t kHolesOfNoMatter = 1'000'000;
 
@@ -42,27 +42,29 @@ bool copyTo(const std::string& target, int from, const struct stat& status) {
 }
 
 /// Copies so many bytes from the offsets on, fewer if the file ends before.
-bool copyBytes(int from, int to, std::uint64_t count) {
+bool copyBytes(int from, int to, std::uint64_t count, const std::function<void(std::uint64_t)>& told) {
   ssize_t copied = 1;
-  while (count > 0 && (copied = ::copy_file_range(from, nullptr, to, nullptr, std::min(count, kCopyChunk), 0)) > 0) {
+  const auto take = [&count, &copied, &told] {
     count -= static_cast<std::uint64_t>(copied);
+    if (told) told(static_cast<std::uint64_t>(copied));
+  };
+  while (count > 0 && (copied = ::copy_file_range(from, nullptr, to, nullptr, std::min(count, kCopyChunk), 0)) > 0) {
+    take();
   }
   if (count == 0 || copied == 0) return true;
   // Both calls advance the offsets only by what was copied, so the next method continues where this one stopped.
-  while (count > 0 && (copied = ::sendfile(to, from, nullptr, std::min(count, kCopyChunk))) > 0) {
-    count -= static_cast<std::uint64_t>(copied);
-  }
+  while (count > 0 && (copied = ::sendfile(to, from, nullptr, std::min(count, kCopyChunk))) > 0) take();
   return count == 0 || copied == 0;
 }
 
 /// Copies what is between the holes of a file: a model may have left one of many gigabytes that is a single hole.
-bool copyAroundHoles(int from, int to, off_t size) {
+bool copyAroundHoles(int from, int to, off_t size, const std::function<void(std::uint64_t)>& told) {
   off_t end = 0;
   off_t begin = 0;
   while ((begin = ::lseek(from, end, SEEK_DATA)) >= 0) {
     end = ::lseek(from, begin, SEEK_HOLE);
     if (end < begin || ::lseek(from, begin, SEEK_SET) < 0 || ::lseek(to, begin, SEEK_SET) < 0) return false;
-    if (!copyBytes(from, to, static_cast<std::uint64_t>(end - begin))) return false;
+    if (!copyBytes(from, to, static_cast<std::uint64_t>(end - begin), told)) return false;
   }
   return errno == ENXIO && ::ftruncate(to, size) == 0;
 }
@@ -70,13 +72,25 @@ bool copyAroundHoles(int from, int to, off_t size) {
 }  // namespace
 
 bool copyContent(int from, int to) {
-  if (::ioctl(to, FICLONE, from) == 0) return true;
+  BlockSharing unknown = BlockSharing::unknown;
+  return copyContent(from, to, {}, unknown);
+}
+
+bool copyContent(int from, int to, const std::function<void(std::uint64_t)>& copied, BlockSharing& sharing) {
   struct stat status {};
-  const bool hasHoles =
-      ::fstat(from, &status) == 0 && status.st_blocks * kStatBlock < status.st_size - kHolesOfNoMatter;
+  const bool isKnown = ::fstat(from, &status) == 0;
+  if (sharing != BlockSharing::impossible) {
+    if (::ioctl(to, FICLONE, from) == 0) {
+      sharing = BlockSharing::possible;
+      if (copied) copied(isKnown ? static_cast<std::uint64_t>(status.st_size) : 0);
+      return true;
+    }
+    if (errno == EOPNOTSUPP || errno == ENOTTY) sharing = BlockSharing::impossible;
+  }
+  const bool hasHoles = isKnown && status.st_blocks * kStatBlock < status.st_size - kHolesOfNoMatter;
   if (hasHoles && (::lseek(from, 0, SEEK_DATA) >= 0 || errno == ENXIO))
-    return copyAroundHoles(from, to, status.st_size);
-  return copyBytes(from, to, std::numeric_limits<std::uint64_t>::max());
+    return copyAroundHoles(from, to, status.st_size, copied);
+  return copyBytes(from, to, std::numeric_limits<std::uint64_t>::max(), copied);
 }
 
 bool putBackIfRemoved(int descriptor, const std::string& path) {

@@ -102,7 +102,8 @@ inline constexpr RunFile kFailedRuns{.stem = "calSimErr", .extension = ".dat", .
 inline constexpr RunFile kFailedRunsLock{.stem = "calSimErr", .extension = "._lock_", .mark = ""};
 inline constexpr RunFile kOwnFailedRuns{.stem = "_calSimErr", .extension = ".dat", .mark = kFailuresMark};
 
-/// An empty file by which a process folder, or a copy of one, is known. A model that removes its logs leaves it.
+/// The file by which a process folder, or a copy of one, is known; a model that removes its logs leaves it. It is empty
+/// or says what the files of the folder are copies of (processes/kept_files).
 inline constexpr char kFolderMark[] = ".mirevo_process";
 /// The file in a process folder that receives the output of its batch.
 inline constexpr char kBatchLog[] = "mirevo_batch.log";

@@ -23,6 +23,7 @@
 #include "common/text.h"
 #include "parameters/read_template.h"
 #include "platform/processes/folder_room.h"
+#include "platform/processes/folder_tree.h"
 #include "platform/processes/leaving_links.h"
 #include "platform/processes/own_files.h"
 #include "platform/processes/process_folder.h"

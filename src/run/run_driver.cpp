@@ -205,6 +205,7 @@ void RunDriver::buildModel() {
   LauncherSettings settings = launcherSettings(config_, slotCount);
   settings.warn = [this](std::string_view text) { warn(text); };
   if (state_.job->hasWorkers()) lockProcessFoldersOfJob(settings.processFolderPrefix);
+  settings.tellOfFolders = [this](const FoldersMade& made) { tellOfFolders(made); };
   settings.isCancelled = [this] {  // copying a large model takes time
     if (!state_.progress.isCancelled()) return false;
     state_.log.line("Simulation cancelled");
@@ -213,6 +214,21 @@ void RunDriver::buildModel() {
   };
   runner_ = std::make_unique<ModelRunner>(describeModel(config_), *parameters_, *aggregator_, *launcher_, settings);
   results_->requireSameTimes(config_, runner_->output().observedSeries());
+}
+
+/// Of what takes long only.
+void RunDriver::tellOfFolders(const FoldersMade& made) {
+  const bool isDone = made.share >= 1.0;
+  if (made.seconds - toldOfFolders_ < 1.0 && !(isDone && toldOfFolders_ > 0.0)) return;
+  toldOfFolders_ = made.seconds;
+  const std::string folders = made.folders == 1 ? "1 process folder" : fmt::format("{} process folders", made.folders);
+  state_.progress.writeStatus(fmt::format("Copying the model to {}: {:.0f} %", folders, made.share * 100.0));
+  if (!isDone) return;
+  const double megabytes = static_cast<double>(made.bytes) / 1e6;
+  state_.log.line(
+      fmt::format("Making {} of the model's {:.1f} MB took {:.1f} s: {} files were copied, {} were there "
+                  "and unchanged",
+                  folders, megabytes, made.seconds, made.files - made.keptFiles, made.keptFiles));
 }
 
 void RunDriver::logSetup() {

@@ -60,6 +60,7 @@ class RunDriver final {
   void warn(std::string_view text);
   void lockProcessFoldersOfJob(const std::string& prefix);
   void buildModel();
+  void tellOfFolders(const FoldersMade& made);
   void logSetup();
   void openResults();
   void putEarlierReportAside();
@@ -93,6 +94,7 @@ class RunDriver final {
   void tellOfWarnings() const;
 
   std::optional<LiveLine> liveLine_;
+  double toldOfFolders_ = 0.0;  ///< seconds after their making had begun
   RunState state_;
   FileLock runLock_;      ///< on the files with the setup's name
   FileLock processLock_;  ///< the master's, on the process folders of the job

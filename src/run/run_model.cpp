@@ -46,6 +46,7 @@ LauncherSettings launcherSettings(const RunConfig& config, int slotCount, int fi
   settings.batchItems = config.batchItems;
   settings.slotCount = slotCount;
   settings.firstFolderNumber = firstFolderNumber;
+  settings.linksReadOnlyFiles = config.linksReadOnlyFiles;
   settings.useSingleThread = config.useSingleThread;
   settings.maxSeconds = config.maxSimulationTime;
   return settings;

@@ -98,6 +98,15 @@ std::string printable(std::string_view line) {
   return std::string(trimTrailing(text));
 }
 
+/// Calls `look` at most so often.
+std::function<void()> everyTenthOfSecond(const std::function<void()>& look) {
+  return [look, last = runTimeClock()]() mutable {
+    if (runTimeClock() - last < 0.1) return;
+    look();
+    last = runTimeClock();
+  };
+}
+
 std::string textOf(const FatalError& error) {
   return error.detail().empty() ? error.message() : error.message() + "\n" + error.detail();
 }
@@ -136,6 +145,7 @@ bool PosixProcessLauncher::initialise(const LauncherSettings& settings) {
   baseFolder_ = settings.baseFolder;
   processFolderPrefix_ = settings.processFolderPrefix;
   ownFiles_ = settings.ownFiles;
+  linksReadOnlyFiles_ = settings.linksReadOnlyFiles;
   warn_ = settings.warn;
   try {
     std::vector<std::vector<std::string>> arguments;
@@ -155,11 +165,8 @@ bool PosixProcessLauncher::initialise(const LauncherSettings& settings) {
     groups_->makeCurrent();
     startGuard();
     lockFolders(settings);
-    slots_.reserve(static_cast<std::size_t>(settings.slotCount));
-    for (int number = 1; number <= settings.slotCount; ++number) {
-      if (settings.isCancelled && settings.isCancelled()) throw RunCancelled();
-      prepareSlot(settings, number, arguments);
-    }
+    makeFolders(settings);
+    for (int number = 1; number <= settings.slotCount; ++number) prepareSlot(settings, number, arguments);
   } catch (const FatalError& error) {
     lastError_ = textOf(error);
     return false;
@@ -202,21 +209,40 @@ void PosixProcessLauncher::lockFolders(const LauncherSettings& settings) {
   if (settings.warn && !lock_.warning().empty()) settings.warn(lock_.warning());
 }
 
-void PosixProcessLauncher::prepareSlot(const LauncherSettings& settings, int number,
-                                       const std::vector<std::vector<std::string>>& arguments) {
-  Slot& slot = slots_.emplace_back();
-  slot.folder = settings.processFolderPrefix + std::to_string(settings.firstFolderNumber + number - 1);
+void PosixProcessLauncher::makeFolders(const LauncherSettings& settings) {
   std::error_code failed;
   const auto resolved = [&failed](const std::string& folder) {
     std::string path = std::filesystem::weakly_canonical(folder, failed).string();
     if (failed) fatalError(fmt::format("Unable to look at {}: {}", folder, failed.message()));
     return path;
   };
-  if (pathInFolder(resolved(settings.baseFolder), resolved(slot.folder))) {
-    fatalError(fmt::format("The model's folder {} lies in the process folder {}, which is made anew for every run",
-                           settings.baseFolder, slot.folder));
+  slots_.reserve(static_cast<std::size_t>(settings.slotCount));
+  std::vector<std::string> folders;
+  for (int number = 0; number < settings.slotCount; ++number) {
+    const std::string& folder =
+        folders.emplace_back(settings.processFolderPrefix + std::to_string(settings.firstFolderNumber + number));
+    if (pathInFolder(resolved(settings.baseFolder), resolved(folder))) {
+      fatalError(fmt::format("The model's folder {} lies in the process folder {}, which is made anew for every run",
+                             settings.baseFolder, folder));
+    }
+    slots_.emplace_back().folder = folder;
   }
-  makeProcessFolder(baseFolder_, slot.folder, processFolderPrefix_);
+  const auto look = [&settings] {
+    if (settings.isCancelled && settings.isCancelled()) throw RunCancelled();
+  };
+  look();
+  const FolderListing listing = listFolder(baseFolder_, processFolderPrefix_, everyTenthOfSecond(look));
+  const FoldersMade made = makeProcessFolders(listing, folders, {ownFiles_, linksReadOnlyFiles_},
+                                              [&settings, &look](const FoldersMade& soFar) {
+                                                if (settings.tellOfFolders) settings.tellOfFolders(soFar);
+                                                look();
+                                              });
+  if (settings.tellOfFolders) settings.tellOfFolders(made);
+}
+
+void PosixProcessLauncher::prepareSlot(const LauncherSettings& settings, int number,
+                                       const std::vector<std::vector<std::string>>& arguments) {
+  Slot& slot = slotAt(number);
   slot.isMade = true;
   slot.mark = mark_.variable(number);
   left_->addSlot(slot.folder);
@@ -251,7 +277,9 @@ void PosixProcessLauncher::prepareEnvironment(bool useSingleThread) {
 bool PosixProcessLauncher::renewFolder(int slotNumber) {
   const std::string& folder = slotAt(slotNumber).folder;
   try {
-    makeProcessFolderAnew(baseFolder_, folder, processFolderPrefix_);
+    CopyProgress unseen;
+    makeProcessFolderAnew(listFolder(baseFolder_, processFolderPrefix_), folder, {ownFiles_, linksReadOnlyFiles_},
+                          unseen);
     makeFilesOwn(folder, baseFolder_, ownFiles_, processFolderPrefix_);
   } catch (const FatalError& error) {
     lastError_ = textOf(error);

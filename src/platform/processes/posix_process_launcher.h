@@ -69,6 +69,7 @@ class PosixProcessLauncher final : public ProcessLauncher {
   const Slot& slotAt(int slot) const { return slots_.at(static_cast<std::size_t>(slot - 1)); }
   int numberOf(const Slot& slot) const { return static_cast<int>(&slot - slots_.data()) + 1; }
   void lockFolders(const LauncherSettings& settings);
+  void makeFolders(const LauncherSettings& settings);
   void prepareSlot(const LauncherSettings& settings, int number,
                    const std::vector<std::vector<std::string>>& arguments);
   void prepareEnvironment(bool useSingleThread);
@@ -87,6 +88,7 @@ class PosixProcessLauncher final : public ProcessLauncher {
   std::string baseFolder_;
   std::string processFolderPrefix_;
   std::vector<std::string> ownFiles_;
+  bool linksReadOnlyFiles_ = false;
   FileLock lock_;  ///< on the process folders
   MonotonicClock clock_;
   double graceSeconds_ = 0.0;

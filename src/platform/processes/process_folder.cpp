@@ -1,19 +1,15 @@
 #include "platform/processes/process_folder.h"
 
-#include <algorithm>
 #include <array>
 #include <cerrno>
 #include <climits>
-#include <cstring>
-#include <dirent.h>
+#include <cstdint>
 #include <fcntl.h>
 #include <filesystem>
-#include <memory>
-#include <optional>
 #include <sys/stat.h>
 #include <unistd.h>
+#include <unordered_set>
 #include <utility>
-#include <vector>
 
 #include <fmt/core.h>
 
@@ -23,88 +19,56 @@
 #include "common/paths.h"
 #include "common/replaceable_files.h"
 #include "common/run_files.h"
-#include "common/take_text.h"
+#include "platform/processes/folder_tree.h"
 #include "platform/processes/leaving_links.h"
-#include "platform/processes/run_made_entries.h"
 
 namespace mirevo {
 namespace {
 
-[[noreturn]] void fail(std::string_view what, const std::string& path, int error) {
-  fatalError(fmt::format("Unable to {} {}: {}", what, path, std::strerror(error)));
-}
-
-/// Whether the error means that an entry seen a moment ago is gone. If a setup is in its model's folder, other ranks of
-/// the job and runs of other setups may be working in the folder that is copied.
-bool hasVanished(int error) {
-  return error == ENOENT || error == ESTALE;
-}
-
-/// The names in a folder, sorted, without "." and ".."; empty when there is no such folder.
-std::optional<std::vector<std::string>> namesIn(const std::string& path) {
-  const std::unique_ptr<DIR, int (*)(DIR*)> folder(::opendir(path.c_str()), &::closedir);
-  if (!folder && hasVanished(errno)) return std::nullopt;
-  if (!folder) fail("read the folder", path, errno);
-  std::vector<std::string> names;
-  errno = 0;
-  while (const dirent* entry = ::readdir(folder.get())) {
-    const std::string_view name = entry->d_name;
-    if (name != "." && name != "..") names.emplace_back(name);
-    errno = 0;
-  }
-  if (errno != 0) fail("read the folder", path, errno);
-  std::sort(names.begin(), names.end());
-  return names;
-}
-
-/// The status of `path` itself, not of a link's target; empty when nothing is there.
-std::optional<struct stat> statusOf(const std::string& path) {
-  struct stat status {};
-  if (::lstat(path.c_str(), &status) == 0) return status;
-  if (errno == ESTALE && ::lstat(path.c_str(), &status) == 0) return status;  // another took its place
-  if (!hasVanished(errno)) fail("look at", path, errno);
-  return std::nullopt;
-}
-
-bool isFolder(const struct stat& status) {
-  return S_ISDIR(status.st_mode);
-}
-
-/// Whether the entry of a process folder is not the model's.
-bool isOwn(std::string_view name) {
-  return name == run_files::kBatchLog || name == run_files::kFolderMark;
-}
+using namespace folder_tree;
 
 void copyTimes(int to, const struct stat& status) {
   const std::array<timespec, 2> times = {status.st_atim, status.st_mtim};
   ::futimens(to, times.data());  // a copy with other times is still a copy
 }
 
-/// False if the file has vanished.
-bool isFileCopied(const std::string& source, const std::string& target, const struct stat& status) {
-  const Descriptor from(::open(source.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW));
-  if (from.get() < 0 && hasVanished(errno)) return false;
-  if (from.get() < 0) fail("read", source, errno);
-  Descriptor to(::open(target.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, S_IRUSR | S_IWUSR));
-  if (to.get() < 0) fail("create", target, errno);
-  if (status.st_size > 0 && !copyContent(from.get(), to.get())) {
-    const int error = errno;
-    if (!hasVanished(error)) fail("write", target, error);
-    ::unlink(target.c_str());  // removed on another machine that has this disk
-    return false;
-  }
-  if (::fchmod(to.get(), status.st_mode & 07777) != 0) fail("set the mode of", target, errno);
-  copyTimes(to.get(), status);
-  if (!to.close()) fail("write", target, errno);
-  return true;
-}
+/// Copies files, and tells `progress` of it. It remembers whether the disk shares blocks between files, so that this is
+/// tried once.
+class FileCopies final {
+ public:
+  explicit FileCopies(CopyProgress& progress) : progress_(progress) {}
 
-void copyFile(const std::string& source, const std::string& target, const struct stat& status) {
-  if (isFileCopied(source, target, status)) return;
-  // One that another has replaced is there again under its name; a model must not lack it.
-  const auto now = statusOf(source);
-  if (now && S_ISREG(now->st_mode)) isFileCopied(source, target, *now);
-}
+  void copy(const std::string& source, const std::string& target) {
+    // One that another has replaced is there again under its name; a model must not lack it.
+    if (!isCopied(source, target)) isCopied(source, target);
+  }
+
+ private:
+  /// False if the file has vanished.
+  bool isCopied(const std::string& source, const std::string& target) {
+    const Descriptor from(::open(source.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
+    if (from.get() < 0 && hasVanished(errno)) return false;
+    struct stat status {};
+    if (from.get() < 0 || ::fstat(from.get(), &status) != 0) fail("read", source, errno);
+    if (!S_ISREG(status.st_mode)) return true;  // something else has taken its place
+    Descriptor to(::open(target.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, S_IRUSR | S_IWUSR));
+    if (to.get() < 0) fail("create", target, errno);
+    const auto told = [this](std::uint64_t bytes) { progress_.add(bytes); };
+    if (status.st_size > 0 && !copyContent(from.get(), to.get(), told, sharing_)) {
+      const int error = errno;
+      if (!hasVanished(error)) fail("write", target, error);
+      ::unlink(target.c_str());  // removed on another machine that has this disk
+      return false;
+    }
+    if (::fchmod(to.get(), status.st_mode & 07777) != 0) fail("set the mode of", target, errno);
+    copyTimes(to.get(), status);
+    if (!to.close()) fail("write", target, errno);
+    return true;
+  }
+
+  CopyProgress& progress_;
+  BlockSharing sharing_ = BlockSharing::unknown;
+};
 
 /// Whether a relative link in a folder, `below` the root, leads to its target without leaving the root.
 bool staysInside(const std::filesystem::path& below, const std::filesystem::path& link) {
@@ -152,157 +116,77 @@ void copyLink(const std::string& source, const std::string& target, const std::s
   if (::symlink(content.c_str(), target.c_str()) != 0) fail("create the link", target, errno);
 }
 
-/// The folder in which this run makes its process folders, and how their names begin.
-class ProcessFolderNames final {
- public:
-  explicit ProcessFolderNames(std::string_view prefix) {
-    const std::size_t slash = prefix.rfind('/');
-    beginning_ = prefix.substr(slash + 1);
-    isKnown_ = ::stat(std::string(prefix.substr(0, slash + 1)).c_str(), &parent_) == 0;
-  }
+/// First of all, so that the folder is known for what it is, however the copying ends.
+void makeMark(const std::string& folder) {
+  const std::string path = folder + "/" + run_files::kFolderMark;
+  Descriptor mark(::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0666));
+  if (mark.get() < 0 || !mark.close()) fail("create", path, errno);
+}
 
-  /// Compares device and inode, as the path may contain a link.
-  bool liesIn(const struct stat& folder) const {
-    return isKnown_ && folder.st_dev == parent_.st_dev && folder.st_ino == parent_.st_ino;
-  }
-  bool contains(std::string_view name) const {
-    if (!takeText(name, beginning_)) return false;
-    return name == run_files::kProcessLock.extension || isDigits(name);
-  }
-
- private:
-  std::string_view beginning_;
-  struct stat parent_ {};
-  bool isKnown_ = false;
-};
-
-struct CopiedFolder {
-  std::string target;
-  struct stat status;
-};
-
-/// Copies a folder without what runs have made in it; without recursion.
+/// Makes a copy of a listed folder.
 class FolderCopy final {
  public:
-  /// `isMarked`: the copy gets the mark of a process folder.
-  FolderCopy(const std::string& source, const std::string& target, std::string_view processFolderPrefix, bool isMarked)
-      : source_(source), target_(target), processFolders_(processFolderPrefix), isMarked_(isMarked) {}
+  /// Entries whose paths are in `remaining` are there already. `isMarked`: the copy gets the mark of a process folder.
+  FolderCopy(const FolderListing& listing, const std::string& target, const FolderMaking& making,
+             const std::unordered_set<std::string>& remaining, bool isMarked, CopyProgress& progress)
+      : listing_(listing),
+        target_(target),
+        making_(making),
+        remaining_(remaining),
+        isMarked_(isMarked),
+        progress_(progress),
+        files_(progress) {}
 
   void copyAll() {
-    pending_ = {""};  // paths below the root, each with its leading "/"
-    while (!pending_.empty()) {
-      const std::string below = std::move(pending_.back());
-      pending_.pop_back();
-      copyFolder(below);
+    for (const FolderListing::Entry& entry : listing_.entries) {
+      const bool isThere = remaining_.contains(entry.path);
+      if (!isThere) copyEntry(entry);
+      if (S_ISREG(entry.mode)) progress_.addFile(static_cast<std::uint64_t>(entry.state.size), isThere);
     }
     // Folders are writable while they are filled; their modes and times are set afterwards.
-    for (auto folder = made_.rbegin(); folder != made_.rend(); ++folder) {
-      const Descriptor opened(::open(folder->target.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
-      if (opened.get() < 0 || ::fchmod(opened.get(), (folder->status.st_mode & 07777) | S_IRWXU) != 0) {
-        fail("set the mode of", folder->target, errno);
+    for (auto entry = listing_.entries.rbegin(); entry != listing_.entries.rend(); ++entry) {
+      if (!S_ISDIR(entry->mode)) continue;
+      const std::string folder = target_ + entry->path;
+      const Descriptor opened(::open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+      if (opened.get() < 0 || ::fchmod(opened.get(), (entry->mode & 07777) | S_IRWXU) != 0) {
+        fail("set the mode of", folder, errno);
       }
-      copyTimes(opened.get(), folder->status);
+      const std::int64_t modified = entry->state.modified;
+      const std::array<timespec, 2> times = {timespec{0, UTIME_OMIT},
+                                             timespec{modified / kSecond, static_cast<long>(modified % kSecond)}};
+      ::futimens(opened.get(), times.data());  // a copy with other times is still a copy
     }
   }
 
  private:
-  void copyFolder(const std::string& below) {
-    const std::string from = source_ + below;
-    const std::string to = target_ + below;
-    const auto names = namesIn(from);
-    struct stat status {};
-    if (!names || ::stat(from.c_str(), &status) != 0) {
-      const int error = names ? errno : ENOENT;
-      if (!below.empty() && hasVanished(error)) return;
-      fail("read the folder", from, error);
-    }
-    if (::mkdir(to.c_str(), S_IRWXU) != 0) fail("create the folder", to, errno);
-    made_.push_back({to, status});
-    if (below.empty() && isMarked_) makeMark(to);
-    const bool holdsProcessFolders = processFolders_.liesIn(status);
-    const RunMadeEntries runMade(from, *names);
-    for (const std::string& name : *names) {
-      const bool isMark = below.empty() && isOwn(name);
-      const bool isProcessFolder = holdsProcessFolders && processFolders_.contains(name);
-      if (isMark || isProcessFolder || runMade.contains(name)) continue;
-      std::string path = below;
-      copyEntry(path.append("/").append(name));
-    }
-  }
+  static constexpr std::int64_t kSecond = 1'000'000'000;
 
-  /// First of all, so that the folder is known for what it is, however the copying ends.
-  static void makeMark(const std::string& folder) {
-    const std::string path = folder + "/" + run_files::kFolderMark;
-    Descriptor mark(::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0666));
-    if (mark.get() < 0 || !mark.close()) fail("create", path, errno);
-  }
-
-  void copyEntry(const std::string& path) {
-    const std::string from = source_ + path;
-    const std::string to = target_ + path;
-    const auto status = statusOf(from);
-    if (!status) return;
-    if (isFolder(*status)) {
-      pending_.push_back(path);
-    } else if (S_ISLNK(status->st_mode)) {
-      copyLink(from, to, source_, target_);
-    } else if (S_ISREG(status->st_mode)) {
-      copyFile(from, to, *status);
-    } else if (S_ISFIFO(status->st_mode) && ::mkfifo(to.c_str(), status->st_mode & 07777) != 0) {
+  void copyEntry(const FolderListing::Entry& entry) {
+    const std::string from = listing_.folder + entry.path;
+    const std::string to = target_ + entry.path;
+    if (S_ISDIR(entry.mode)) {
+      if (::mkdir(to.c_str(), S_IRWXU) != 0) fail("create the folder", to, errno);
+      if (entry.path.empty() && isMarked_) makeMark(to);
+    } else if (S_ISLNK(entry.mode)) {
+      copyLink(from, to, listing_.folder, target_);
+    } else if (S_ISREG(entry.mode)) {
+      // Where the disk has no such links, or not so many, a copy does as well.
+      if (!making_.links(entry) || ::link(from.c_str(), to.c_str()) != 0) files_.copy(from, to);
+    } else if (::mkfifo(to.c_str(), entry.mode & 07777) != 0) {
       fail("create", to, errno);
     }
   }
 
-  const std::string& source_;
+  const FolderListing& listing_;
   const std::string& target_;
-  ProcessFolderNames processFolders_;
+  const FolderMaking& making_;
+  const std::unordered_set<std::string>& remaining_;
   bool isMarked_;
-  std::vector<std::string> pending_;
-  std::vector<CopiedFolder> made_;
+  CopyProgress& progress_;
+  FileCopies files_;
 };
 
 }  // namespace
-
-void removeTree(const std::string& root) {
-  // Depth-first without recursion: each folder is visited once to push its entries and, after these, once to remove it.
-  struct Visit {
-    std::string path;
-    bool emptied;
-  };
-  std::vector<Visit> visits;
-  visits.push_back({root, false});
-  while (!visits.empty()) {
-    const Visit visit = visits.back();
-    visits.pop_back();
-    if (visit.emptied) {
-      if (::rmdir(visit.path.c_str()) != 0 && !hasVanished(errno)) fail("remove the folder", visit.path, errno);
-      continue;
-    }
-    const auto status = statusOf(visit.path);
-    if (!status) continue;
-    if (!isFolder(*status)) {
-      if (::unlink(visit.path.c_str()) != 0 && !hasVanished(errno)) fail("remove", visit.path, errno);
-      continue;
-    }
-    ::chmod(visit.path.c_str(), S_IRWXU);  // a model may have made it read-only; a failure is noticed below
-    visits.push_back({visit.path, true});
-    const auto names = namesIn(visit.path);
-    if (!names) continue;
-    // The root's mark last: what an interruption leaves is still known for what it is.
-    for (const bool pushesOwn : {true, false}) {
-      for (const std::string& name : *names) {
-        if ((visit.path == root && isOwn(name)) == pushesOwn) visits.push_back({visit.path + "/" + name, false});
-      }
-    }
-  }
-}
-
-void removeIfPossible(const std::string& root) {
-  try {
-    removeTree(root);
-  } catch (const FatalError&) {  // what is wrong with its disk or modes is told already
-  }
-}
 
 std::string processLockPath(std::string_view processFolderPrefix) {
   return std::string(processFolderPrefix).append(run_files::kProcessLock.extension);
@@ -316,19 +200,40 @@ std::string processFoldersInUse(std::string_view processFolderPrefix, std::strin
 }
 
 void copyFolder(const std::string& source, const std::string& target, std::string_view processFolderPrefix) {
-  FolderCopy(source, target, processFolderPrefix, false).copyAll();
+  CopyProgress unseen;
+  FolderCopy(listFolder(source, processFolderPrefix), target, {}, {}, false, unseen).copyAll();
+}
+
+void requireProcessFolder(const std::string& target) {
+  const std::string why = whyNotReplaceable(target, run_files::kProcessFolder);
+  if (!why.empty()) fatalError(fmt::format("{} has the name of a process folder. {}", target, why));
 }
 
 void makeProcessFolder(const std::string& source, const std::string& target, std::string_view processFolderPrefix) {
-  const std::string why = whyNotReplaceable(target, run_files::kProcessFolder);
-  if (!why.empty()) fatalError(fmt::format("{} has the name of a process folder. {}", target, why));
-  makeProcessFolderAnew(source, target, processFolderPrefix);
+  requireProcessFolder(target);
+  const FolderListing listing = listFolder(source, processFolderPrefix);
+  CopyProgress unseen;
+  makeProcessFolderAnew(listing, target, {}, unseen);
 }
 
-void makeProcessFolderAnew(const std::string& source, const std::string& target, std::string_view processFolderPrefix) {
-  removeTree(target);
+void makeProcessFolderAnew(const FolderListing& listing, const std::string& target, const FolderMaking& making,
+                           CopyProgress& progress) {
+  removeTree(target, [&progress] { progress.look(); });
   try {
-    FolderCopy(source, target, processFolderPrefix, true).copyAll();
+    FolderCopy(listing, target, making, {}, true, progress).copyAll();
+    recordCopies(target, listing, making);
+  } catch (const FatalError&) {
+    removeIfPossible(target);
+    throw;
+  }
+}
+
+void renewProcessFolder(const FolderListing& listing, const ListedPaths& paths, const std::string& target,
+                        const FolderMaking& making, CopyProgress& progress) {
+  try {
+    const auto remaining = removeAllButUnchanged(target, listing, paths, making, [&progress] { progress.look(); });
+    FolderCopy(listing, target, making, remaining, true, progress).copyAll();
+    recordCopies(target, listing, making);
   } catch (const FatalError&) {
     removeIfPossible(target);
     throw;

@@ -6,6 +6,8 @@
 #include <string_view>
 #include <vector>
 
+#include "platform/processes/folder_makers.h"
+
 namespace mirevo {
 
 /// One item of the simulation batch; the items of a batch run one after another.
@@ -23,9 +25,11 @@ struct LauncherSettings {
   int firstFolderNumber = 1;                        ///< number of the folder of slot 1; those of the other slots follow
   bool useSingleThread = false;                     ///< sets the usual thread-count variables to 1 for the model
   std::function<void(std::string_view)> warn = {};  ///< takes what the user should know
-  std::function<bool()> isCancelled = {};  ///< called between the folders of two slots; true throws RunCancelled
-  double graceSeconds = 2.0;               ///< between SIGTERM and SIGKILL when processes are halted
-  double maxSeconds = 0.0;  ///< longest time that a slot's batch may run, all items together; 0: no limit
+  bool linksReadOnlyFiles = false;                  ///< in the folders of slots, in place of copies
+  std::function<bool()> isCancelled = {};  ///< called while the folders of slots are made; true throws RunCancelled
+  std::function<void(const FoldersMade&)> tellOfFolders = {};  ///< called then ten times a second, and at the end
+  double graceSeconds = 2.0;  ///< between SIGTERM and SIGKILL when processes are halted
+  double maxSeconds = 0.0;    ///< longest time that a slot's batch may run, all items together; 0: no limit
 };
 
 /// How a slot's batch ended.
@@ -59,7 +63,8 @@ class ProcessLauncher {
   ProcessLauncher& operator=(const ProcessLauncher&) = delete;
   virtual ~ProcessLauncher() = default;
 
-  /// Makes every slot's process folder a fresh copy of the base folder, with each of the own files in it or nowhere.
+  /// Makes every slot's process folder a copy of the base folder, with each of the own files in it or nowhere. What
+  /// remains there of an earlier run is certain to be the same.
   /// False when that fails; lastError() says why.
   virtual bool initialise(const LauncherSettings& settings) = 0;
   virtual const std::string& lastError() const = 0;

@@ -10,7 +10,7 @@
 #include "common/run_files.h"
 #include "common/text.h"
 #include "common/utf8.h"
-#include "platform/processes/process_folder.h"
+#include "platform/processes/folder_tree.h"
 
 namespace mirevo {
 namespace {

@@ -56,6 +56,7 @@ struct RunConfig {
   std::int32_t simultaneousSimulations = 1;
   bool usesMpiWorkers = false;  ///< then `simultaneousSimulations` is 1, for each worker
   bool useSingleThread = false;
+  bool linksReadOnlyFiles = false;
   std::string processFolder;       ///< folder for the process folders; empty: that of the setup
   double maxSimulationTime = 0.0;  ///< longest time of a model run, s; 0: no limit
 

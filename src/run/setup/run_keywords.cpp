@@ -108,6 +108,12 @@ const SettingSection<RunConfig>& slotsSection() {
                                                 "Folder in which the process folders are made, such as a disk of "
                                                 "the computing node; blank: beside the setup.",
                                             .bearsOnResults = kNotOfResults}),
+        setting<&RunConfig::linksReadOnlyFiles>(
+            {.name = "Link_Read_Only_Files",
+             .defaultValue = "0",
+             .meaning = "1: files that nobody may write are hard links in the process folders, not copies. A model run "
+                        "that writes to one all the same, as root can, changes the model itself.",
+             .bearsOnResults = kNotOfResults}),
         setting<&RunConfig::maxSimulationTime>(
             {.name = "MaxSimulationTime",
              .defaultValue = "0.0",

@@ -2,8 +2,10 @@
 
 #include <csignal>
 #include <fcntl.h>
+#include <functional>
 #include <iterator>
 #include <map>
+#include <set>
 #include <sstream>
 #include <string>
 #include <sys/resource.h>
@@ -11,12 +13,17 @@
 #include <system_error>
 #include <tuple>
 #include <unistd.h>
+#include <vector>
 
+#include <fmt/core.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "common/fatal_error.h"
 #include "common/run_files.h"
+#include "platform/processes/folder_makers.h"
 #include "platform/processes/folder_room.h"
+#include "platform/processes/folder_tree.h"
 #include "refusal.h"
 #include "temporary_folder.h"
 
@@ -170,6 +177,187 @@ TEST(ProcessFolder, KnowsItsOwnBehindALink) {
   makeProcessFolder(folder / "base", folder / "link/cal_Process1", folder / "link/cal_Process");
   EXPECT_TRUE(folder.exists("link/cal_Process1/scratch"));
   EXPECT_TRUE(fs::is_empty(folder / "link/cal_Process1/scratch"));
+}
+
+/// Makes the process folders 1 to `count` of a run.
+FoldersMade makeFolders(
+    const TemporaryFolder& folder, int count, const FolderMaking& making = {},
+    const std::function<void(const FoldersMade&)>& look = [](const FoldersMade&) {}) {
+  std::vector<std::string> targets;
+  for (int i = 1; i <= count; ++i) targets.push_back(folder / ("run_Process" + std::to_string(i)));
+  return makeProcessFolders(listFolder(folder / "base", folder / "run_Process"), targets, making, look);
+}
+
+void setModified(const std::string& path, const struct stat& status) {
+  const timespec times[2] = {status.st_atim, status.st_mtim};
+  ASSERT_EQ(::utimensat(AT_FDCWD, path.c_str(), times, 0), 0);
+}
+
+// Whatever a model, the user or a crash did between two runs, the folder is then what a new copy would be.
+TEST(ProcessFolder, KeepsFromAnEarlierRunOnlyWhatACopyWouldBe) {
+  struct Case {
+    const char* what;
+    std::function<void(const TemporaryFolder&)> happens;
+    bool isKept;
+  };
+  const std::string copy = "run_Process1/in/a.txt";
+  const Case cases[] = {
+      {"nothing", [](const TemporaryFolder&) {}, true},
+      {"a model writes as much as was there, and sets the time back",
+       [&](const TemporaryFolder& folder) {
+         const struct stat before = statusOf(folder / copy);
+         folder.write(copy, "abd");
+         setModified(folder / copy, before);
+       },
+       false},
+      {"the same content is written again", [&](const TemporaryFolder& folder) { folder.write(copy, "abc"); }, false},
+      {"the original is changed, with its time set back",
+       [&](const TemporaryFolder& folder) {
+         const struct stat before = statusOf(folder / "base/in/a.txt");
+         folder.write("base/in/a.txt", "xyz");
+         setModified(folder / "base/in/a.txt", before);
+       },
+       false},
+      {"another file takes its name",
+       [&](const TemporaryFolder& folder) {
+         folder.write("run_Process1/b.txt", "abd");
+         fs::rename(folder / "run_Process1/b.txt", folder / copy);
+       },
+       false},
+      {"its mode is changed", [&](const TemporaryFolder& folder) { fs::permissions(folder / copy, fs::perms(0600)); },
+       false},
+      {"it gets a second name outside",
+       [&](const TemporaryFolder& folder) { fs::create_hard_link(folder / copy, folder / "outside.txt"); }, false},
+      {"it becomes a link to the original",
+       [&](const TemporaryFolder& folder) {
+         fs::remove(folder / copy);
+         fs::create_symlink(folder / "base/in/a.txt", folder / copy);
+       },
+       false},
+      {"its folder becomes a link",
+       [&](const TemporaryFolder& folder) {
+         fs::rename(folder / "run_Process1/in", folder / "moved");
+         fs::create_directory_symlink(folder / "moved", folder / "run_Process1/in");
+       },
+       false},
+      {"a model leaves files and folders",
+       [](const TemporaryFolder& folder) {
+         folder.write("run_Process1/in/left/over.txt", "old");
+         folder.write("run_Process1/empty", "old");
+       },
+       true},
+      {"the record is cut off",
+       [](const TemporaryFolder& folder) {
+         const std::string mark = folder / ("run_Process1/" + std::string(run_files::kFolderMark));
+         fs::resize_file(mark, fs::file_size(mark) - 9);
+       },
+       false},
+      {"the record is damaged",
+       [](const TemporaryFolder& folder) {
+         const std::string mark = "run_Process1/" + std::string(run_files::kFolderMark);
+         std::string text = folder.read(mark);
+         text[text.size() / 2] ^= 1;
+         folder.write(mark, text);
+       },
+       false},
+  };
+  for (const Case& tested : cases) {
+    SCOPED_TRACE(tested.what);
+    const TemporaryFolder folder;
+    folder.write("base/in/a.txt", "abc", 0644);
+    folder.write("base/own.txt", "1");
+    fs::create_symlink("in/a.txt", folder / "base/link");
+    const std::vector<std::string> own{"/own.txt"};
+    makeFolders(folder, 1, {own});
+    const ino_t before = statusOf(folder / copy).st_ino;
+    // Keeps the number of the file's inode from being given to a new one.
+    const int held = ::open((folder / copy).c_str(), O_RDONLY | O_CLOEXEC);
+    tested.happens(folder);
+
+    const FoldersMade made = makeFolders(folder, 1, {own});
+
+    ::close(held);
+    EXPECT_EQ(statusOf(folder / copy).st_ino == before, tested.isKept);
+    EXPECT_EQ(made.keptFiles, tested.isKept ? 1U : 0U);
+    EXPECT_EQ(folder.read(copy), folder.read("base/in/a.txt"));
+    EXPECT_EQ(statusOf(folder / copy).st_mode, statusOf(folder / "base/in/a.txt").st_mode);
+    EXPECT_EQ(statusOf(folder / copy).st_mtim.tv_nsec, statusOf(folder / "base/in/a.txt").st_mtim.tv_nsec);
+    EXPECT_EQ(folder.read("run_Process1/own.txt"), "1");
+    EXPECT_EQ(fs::read_symlink(folder / "run_Process1/link"), "in/a.txt");
+    std::set<std::string> names;
+    for (const auto& entry : fs::recursive_directory_iterator(folder / "run_Process1")) {
+      names.insert(entry.path().filename());
+    }
+    EXPECT_EQ(names, (std::set<std::string>{run_files::kFolderMark, "in", "a.txt", "own.txt", "link"}));
+  }
+}
+
+TEST(ProcessFolder, SeveralAreMadeSideBySide) {
+  const TemporaryFolder folder;
+  for (int i = 0; i < 300; ++i) folder.write(fmt::format("base/in{}/f{}.txt", i % 7, i), std::to_string(i));
+  FoldersMade made = makeFolders(folder, 5);
+  EXPECT_EQ(made.files, 1500U);
+  EXPECT_EQ(made.keptFiles, 0U);
+  made = makeFolders(folder, 5);
+  EXPECT_EQ(made.keptFiles, 1500U);
+  EXPECT_EQ(made.share, 1.0);
+  EXPECT_EQ(folder.read("run_Process5/in5/f299.txt"), "299");
+}
+
+TEST(ProcessFolder, AFailureSideBySideIsToldAndLeavesNoPart) {
+  const TemporaryFolder folder;
+  for (int i = 0; i < 400; ++i) folder.write(fmt::format("base/f{}.txt", i), "1");
+  folder.write("base/z.bin", std::string(100'000, 'z'));
+  const auto before = std::signal(SIGXFSZ, SIG_IGN);
+  rlimit limit{};
+  ::getrlimit(RLIMIT_FSIZE, &limit);
+  const rlimit small{50'000, limit.rlim_max};
+  ::setrlimit(RLIMIT_FSIZE, &small);
+  const std::string refusal = refusalOf([&] { makeFolders(folder, 3); });
+  ::setrlimit(RLIMIT_FSIZE, &limit);
+  std::signal(SIGXFSZ, before);
+  EXPECT_THAT(refusal, testing::MatchesRegex("Unable to write .*run_Process./z.bin: File too large"));
+  for (const char* made : {"run_Process1", "run_Process2", "run_Process3"}) EXPECT_FALSE(folder.exists(made)) << made;
+}
+
+TEST(ProcessFolder, WhatACancellationLeavesIsMadeAnew) {
+  const TemporaryFolder folder;
+  folder.write("base/a.txt", "a");
+  for (int i = 0; i < 800; ++i) folder.write(fmt::format("base/in/f{}.txt", i), "1");
+  const auto cancel = [](const FoldersMade&) { throw RunCancelled(); };
+  bool isCancelled = false;
+  for (int i = 0; i < 20 && !isCancelled; ++i) {
+    try {
+      makeFolders(folder, 8, {}, cancel);
+      for (int slot = 1; slot <= 8; ++slot) removeTree(folder / ("run_Process" + std::to_string(slot)));
+    } catch (const RunCancelled&) {
+      isCancelled = true;
+    }
+  }
+  ASSERT_TRUE(isCancelled);
+  const FoldersMade made = makeFolders(folder, 8);
+  EXPECT_EQ(made.files, 8U * 801U);
+  EXPECT_EQ(folder.read("run_Process8/in/f799.txt"), "1");
+}
+
+TEST(ProcessFolder, LinksReadOnlyFilesOnRequest) {
+  const TemporaryFolder folder;
+  folder.write("base/forcing.bin", "large", 0444);
+  folder.write("base/own.txt", "1", 0444);
+  folder.write("base/state.txt", "1", 0644);
+  const std::vector<std::string> own{"/own.txt"};
+  const auto isLinked = [&folder](const std::string& name) {
+    return fs::equivalent(folder / ("base/" + name), folder / ("run_Process1/" + name));
+  };
+  for (const bool links : {true, true, false}) {  // what one run linked the next one keeps, or replaces
+    makeFolders(folder, 1, {own, links});
+    EXPECT_EQ(isLinked("forcing.bin"), links);
+    EXPECT_FALSE(isLinked("own.txt"));
+    EXPECT_FALSE(isLinked("state.txt"));
+    EXPECT_EQ(folder.read("run_Process1/forcing.bin"), "large");
+  }
+  makeProcessFolder(folder / "run_Process1", folder / "run_Failed1", folder / "run_Process");
+  EXPECT_FALSE(fs::equivalent(folder / "base/forcing.bin", folder / "run_Failed1/forcing.bin"));
 }
 
 }  // namespace
