@@ -17,7 +17,9 @@ class ResultRows final {
  public:
   ResultRows() = default;
   /// Not explicit: whoever has a few rows passes them as they are.
+  // NOLINTNEXTLINE(google-explicit-constructor)
   ResultRows(std::span<const ResultRow> rows);
+  // NOLINTNEXTLINE(google-explicit-constructor)
   ResultRows(const std::vector<ResultRow>& rows) : ResultRows(std::span(rows)) {}
 
   /// Room for so many rows like the first one.
