@@ -72,6 +72,12 @@ void EvaluationLedger::putBack(std::size_t place) {
   --openCount_;
 }
 
+bool EvaluationLedger::takeAgain(std::size_t place) {
+  if (returned_.erase(place) == 0) return false;
+  ++openCount_;
+  return true;
+}
+
 std::vector<double> EvaluationLedger::repeatedMeasures(std::size_t place) const {
   if (runAgain_.contains(place)) return results_[place].measureValues;
   if (earlier_ == nullptr) return {};

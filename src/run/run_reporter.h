@@ -52,6 +52,7 @@ class RunReporter final : public EvaluationObserver {
   void warning(std::string_view text) override;
   void urgentWarning(std::string_view text) override;
   void processesLeft(std::string_view text) override;
+  void runLost(std::string_view text) override;
   void fileAbsent(const std::string& name, std::string_view text) override;
   void recordEvaluation(std::span<const double> set, const EvaluationResult& result) override;
   bool readsSimulatedValues() const override { return simulatedValues_ != nullptr && simulatedValues_->isReadBack(); }
@@ -97,6 +98,8 @@ class RunReporter final : public EvaluationObserver {
   int failedCount() const { return failedCount_; }
   /// Evaluations whose results were taken from an earlier run.
   int replayedCount() const { return replayedCount_; }
+  /// Sets that were handed out once more, as the process that had them was lost.
+  int lostRunCount() const { return lostRunCount_; }
   const FailureSummary& failures() const { return failures_; }
 
  private:
@@ -136,6 +139,7 @@ class RunReporter final : public EvaluationObserver {
   int evaluationCount_ = 0;
   int failedCount_ = 0;
   int replayedCount_ = 0;
+  int lostRunCount_ = 0;
   FailureSummary failures_;
   int firstSuccess_ = 0;  ///< with which others are compared
   /// By kind, evaluation and measure.

@@ -53,8 +53,9 @@ struct RunConfig {
   std::int32_t simultaneousSimulations = 1;
   bool usesMpiWorkers = false;  ///< then `simultaneousSimulations` is 1, for each worker
   bool useSingleThread = false;
-  std::string processFolder;       ///< folder for the process folders; empty: that of the setup
-  double maxSimulationTime = 0.0;  ///< longest time of a model run, s; 0: no limit
+  std::string processFolder;        ///< folder for the process folders; empty: that of the setup
+  double maxSimulationTime = 0.0;   ///< longest time of a model run, s; 0: no limit
+  double maxWorkerSilence = 600.0;  ///< of a worker of a job that has a set, s; 0: no limit
 
   RestartMode restart = RestartMode::startAfresh;
   std::int32_t failedRunFolders = 3;          ///< failed model runs whose process folder is kept
