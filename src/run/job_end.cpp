@@ -49,6 +49,12 @@ std::set<int> lostWorkers(const RunState& state) {
   return state.workers ? state.workers->lost() : std::set<int>{};
 }
 
+/// At the end of a task: a worker that is not ready yet gives no signs of life.
+double patienceSeconds(const RunState& state) {
+  const double limit = state.workers ? state.workers->silenceLimit() : 0.0;
+  return limit > 0.0 ? std::clamp(limit, kWorkerStopSeconds, kWorkerPatienceSeconds) : kWorkerPatienceSeconds;
+}
+
 /// The workers of a job that outlives losses have all said their farewells, but those.
 void leaveWithout(const std::set<int>& missing, RunState& state) {
   state.job->leaveWithout(missing);
@@ -75,7 +81,7 @@ void leaveJob(RunState& state, int exitCode) {
     state.log.warning(text);
     showMessage("Warning: " + text, {}, MessageType::warning);
   };
-  Patience patience(state, exitCode == 0 ? kWorkerPatienceSeconds : kWorkerStopSeconds);
+  Patience patience(state, exitCode == 0 ? patienceSeconds(state) : kWorkerStopSeconds);
   const auto isEnough = [&patience] { return patience.isOver(); };
   std::string reason = "a worker that has stopped does not end";
   try {

@@ -72,6 +72,12 @@ std::string errorText(int code) {
   return {text.data(), static_cast<std::size_t>(length)};
 }
 
+/// As mpirun sees it: it starts a daemon on each of its nodes.
+bool isJobOnOneNode(int processCount) {
+  const char* count = std::getenv("OMPI_COMM_WORLD_LOCAL_SIZE");
+  return count != nullptr && std::atoi(count) == processCount;
+}
+
 /// mpirun ends all processes, and then itself with 1.
 void endLauncher() {
   if (const pid_t launcher = mpirunProcess(); launcher > 0) ::kill(launcher, SIGTERM);
@@ -165,6 +171,7 @@ class MpiJob final : public Job {
   int rank_;
   int processCount_;
   bool isKept_ = launcherKeepsJob();
+  bool isOnOneNode_ = isJobOnOneNode(processCount_);
   MPI_Request leaving_ = MPI_REQUEST_NULL;
   Traffic traffic_;
   NearProcesses near_;                          ///< in a job that outlives losses
@@ -261,6 +268,7 @@ bool MpiJob::finalise(const std::function<bool()>& isEnough) {
 // of its processes has, if one of them was lost.
 void MpiJob::leaveWithout(const std::set<int>& lost) {
   leavesWithout_ = lost;
+  isLauncherBound_ = !isOnOneNode_ && !lost.empty();
   for (const int rank : lost) {
     if (!near_.kill(rank)) isLauncherBound_ = true;
   }
@@ -280,7 +288,7 @@ void MpiJob::finaliseOrLeave(int exitCode) {
     traffic_.complete();
   }
   exitCodeOfLeaving = exitCode;
-  const bool areAllNear = near_.count() + 1 == static_cast<std::size_t>(processCount_);
+  const bool areAllNear = isOnOneNode_ && near_.count() + 1 == static_cast<std::size_t>(processCount_);
   if (rank_ == 0 && (exitCode != 0 || isLauncherBound_ || !areAllNear)) launcherOfLeaving = mpirunProcess();
   if (isLauncherBound_ || exitCode != 0) leaveFromSignal(SIGALRM);
   if (rank_ == 0) keepersOfLeaving = &near_;
