@@ -3,7 +3,12 @@
 # many fit. Needs mpirun and the target mpi_job_folder. The figures in docs/clusters.md come from here.
 #
 #   bench/mpi/measure.sh [build folder] [another Mirevo to compare the start-up with]
+#   bench/mpi/measure.sh --scale [build folder] [numbers of workers]
+#
+# --scale: what a set costs the master, and what memory master and workers take, for each number of workers (8 64 256).
 set -euo pipefail
+scale=0
+[ "${1:-}" != --scale ] || { scale=1; shift; }
 root=$(cd "$(dirname "$0")/../.." && pwd)
 build=$(cd "${1:-$root/build/release}" && pwd)
 other=${2:-}
@@ -43,6 +48,54 @@ mean_milliseconds() { # command...
   for _ in {1..100}; do "$@" >/dev/null; done
   awk -v a="$start" -v b="$EPOCHREALTIME" 'BEGIN { printf "%.2f ms", (b - a) * 10 }'
 }
+
+# Processor time of the master for one set, from its 20th row to its end, and memory of master and of a worker, in MB
+# (anonymous, as program and libraries are shared). Sampled until the job ends.
+cost_of_scale() { # workers, milliseconds of the model, sets
+  write_setup "$3" "$2"
+  rm -f basin*.dat
+  job $(($1 + 1)) >/dev/null 2>&1 &
+  local job=$! master='' worker='' first='' last='' rows=0 first_rows=0 last_rows=0 first_time=0 last_time=0 memory=0 theirs=0 now
+  while kill -0 $job 2>/dev/null; do
+    if [ -z "$master" ] && [ -e basin.dat ]; then
+      for process in $(pgrep -x Mirevo); do
+        [ "$(readlink "/proc/$process/cwd")" = "$work" ] || continue
+        case $(tr '\0' '\n' <"/proc/$process/environ" | grep '^OMPI_COMM_WORLD_RANK=' || true) in
+          *=0) master=${master:-$process} ;;
+          *=1) worker=${worker:-$process} ;;
+        esac
+      done
+    fi
+    if [ -n "$master" ] && now=$(awk '{ print $14 + $15 }' "/proc/$master/stat" 2>/dev/null); then
+      rows=$(grep -c OK basin.dat || true)
+      if [ "$rows" -ge 20 ]; then
+        [ -n "$first" ] || { first=$now first_rows=$rows first_time=$EPOCHREALTIME; }
+        if [ "$rows" -gt "$last_rows" ]; then last=$now last_rows=$rows last_time=$EPOCHREALTIME; fi
+      fi
+      now=$(awk '/^RssAnon/ { print $2 / 1024 }' "/proc/$master/status" 2>/dev/null || true)
+      memory=${now:-$memory}
+      [ -z "$worker" ] || now=$(awk '/^RssAnon/ { print $2 / 1024 }' "/proc/$worker/status" 2>/dev/null || true)
+      [ -z "$worker" ] || theirs=${now:-$theirs}
+    fi
+    sleep 0.1
+  done
+  wait $job
+  awk -v w="$1" -v ms="$2" -v a="${first:-0}" -v b="${last:-0}" -v n=$((last_rows - first_rows)) -v m="${memory:-0}" \
+    -v v="${theirs:-0}" -v s="$first_time" -v e="$last_time" -v hz="$(getconf CLK_TCK)" 'BEGIN {
+      if (n == 0) { print "  1+" w " ranks, " ms " ms: over too soon to be measured"; exit }
+      printf "  1+%d ranks, %d ms: %.2f ms of the master and %.1f sets a second; master %.1f MB, a worker %.1f MB\n",
+        w, ms, (b - a) / hz * 1000 / n, n / (e - s), m, v }'
+}
+
+if [ $scale = 1 ]; then
+  shift $(($# > 0 ? 1 : 0))
+  echo "machine: $(nproc) cores, load $(cut -d' ' -f1 /proc/loadavg)"
+  for workers in ${@:-8 64 256}; do
+    cost_of_scale "$workers" 10 $((workers * 10 + 1000))
+    cost_of_scale "$workers" 1000 $((workers * 10))
+  done
+  exit
+fi
 
 echo "machine: $(nproc) cores, load $(cut -d' ' -f1 /proc/loadavg)"
 echo "start and end of the program (--version, mean of 100): $(mean_milliseconds "$build/Mirevo" --version)"

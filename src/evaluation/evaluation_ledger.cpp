@@ -118,6 +118,13 @@ void EvaluationLedger::putBack(std::size_t place) {
   --runningCount_;
 }
 
+bool EvaluationLedger::takeAgain(std::size_t place) {
+  if (returned_.erase(place) == 0) return false;
+  known_.run(numberOf(place), set(place));  // others may wait for it
+  ++runningCount_;
+  return true;
+}
+
 std::vector<double> EvaluationLedger::repeatedMeasures(std::size_t place) const {
   if (runAgain_.contains(place)) return results_[indexOf(place)].measureValues;
   return earlier_ == nullptr ? std::vector<double>() : earlier_->measuresOf(numberOf(place));

@@ -51,6 +51,8 @@ class EvaluationLedger final {
   std::optional<std::size_t> takeNext();
   /// Takes a set back that could not be run where it was to be; it is the next one again.
   void putBack(std::size_t place);
+  /// Takes a set again that was put back, as its result has come after all; false if it was taken by takeNext() since.
+  bool takeAgain(std::size_t place);
   const ParameterSet& set(std::size_t place) const { return sets_[indexOf(place)]; }
   /// The set's number in the run, from 1.
   static int numberOf(std::size_t place) { return static_cast<int>(place) + 1; }

@@ -26,6 +26,8 @@ class EvaluationObserver {
   virtual void urgentWarning(std::string_view text) { warning(text); }
   /// A model run has left processes that had to be ended; `text` names the evaluation and them.
   virtual void processesLeft(std::string_view text) { warning(text); }
+  /// A process of the job is lost and another runs the set that it had; `text` names the process and the evaluation.
+  virtual void runLost(std::string_view text) { warning(text); }
   /// A model run has not left an output file that is to be kept; `text` names the evaluation and says why. `name`: the
   /// file below the base folder, with its leading "/".
   virtual void fileAbsent(const std::string& name, std::string_view text) {

@@ -1,6 +1,7 @@
 #include "run/job_end.h"
 
 #include <algorithm>
+#include <iterator>
 #include <set>
 #include <string>
 
@@ -44,13 +45,29 @@ class Patience {
   bool isFirst_ = true;
 };
 
+std::set<int> lostWorkers(const RunState& state) {
+  return state.workers ? state.workers->lost() : std::set<int>{};
+}
+
+/// At the end of a task: a worker that is not ready yet gives no signs of life.
+double patienceSeconds(const RunState& state) {
+  const double limit = state.workers ? state.workers->silenceLimit() : 0.0;
+  return limit > 0.0 ? std::clamp(limit, kWorkerStopSeconds, kWorkerPatienceSeconds) : kWorkerPatienceSeconds;
+}
+
+/// The workers of a job that outlives losses have all said their farewells, but those.
+void leaveWithout(const std::set<int>& missing, RunState& state) {
+  state.job->leaveWithout(missing);
+  dismissWorkers(*state.job, missing);
+}
+
 }  // namespace
 
 void stopWorkersOf(RunState& state) {
   if (!state.job->hasWorkers() || state.workersStopped) return;
   state.workersStopped = state.clock();
   try {
-    stopWorkers(*state.job);
+    stopWorkers(*state.job, lostWorkers(state));
   } catch (const FatalError&) {
     // leaveJob() meets it, too
   }
@@ -64,15 +81,23 @@ void leaveJob(RunState& state, int exitCode) {
     state.log.warning(text);
     showMessage("Warning: " + text, {}, MessageType::warning);
   };
-  Patience patience(state, exitCode == 0 ? kWorkerPatienceSeconds : kWorkerStopSeconds);
+  Patience patience(state, exitCode == 0 ? patienceSeconds(state) : kWorkerStopSeconds);
   const auto isEnough = [&patience] { return patience.isOver(); };
   std::string reason = "a worker that has stopped does not end";
   try {
-    const std::set<int> silent = awaitFarewells(*state.job, isEnough, warn);
-    if (silent.empty() && state.job->finalise(isEnough)) return;
+    const std::set<int> lost = lostWorkers(state);
+    const std::set<int> missing = awaitFarewells(*state.job, lost, isEnough, warn);
+    std::set<int> silent;
+    std::set_difference(missing.begin(), missing.end(), lost.begin(), lost.end(), std::inserter(silent, silent.end()));
+    if (!missing.empty()) reason = fmt::format("worker {} is lost", fmt::join(missing, ", "));
     if (!silent.empty()) {
       reason = fmt::format("no answer to the request to stop from worker {}", fmt::join(silent, ", "));
     }
+    if (state.job->outlivesLosses() && (missing.empty() || exitCode == 0)) {
+      if (!silent.empty()) warn("The job was left with " + reason);
+      return leaveWithout(missing, state);
+    }
+    if (missing.empty() && state.job->finalise(isEnough)) return;
   } catch (const FatalError& error) {
     reason = error.message() + "\n" + error.detail();
   }

@@ -251,6 +251,10 @@ void RunDriver::logSetup() {
   if (state_.job->hasWorkers()) {
     state_.log.line(fmt::format("{} job: this master and {} workers, each of which runs one model at a time",
                                 state_.job->means(), state_.job->processCount() - 1));
+    if (config_.maxWorkerSilence > 0.0) {
+      state_.log.line(fmt::format("The set of a worker that gives no sign of life for {:g} s goes to another one",
+                                  config_.maxWorkerSilence));
+    }
   }
   state_.log.line("");
 }
@@ -276,8 +280,9 @@ void RunDriver::openResults() {
   if (scenarioSeries_) reporter_->recordScenarios(*scenarioSeries_);
   failedRunPolicy_.emplace(config_.plannedEvaluations(), config_.failedRunFolders);
   if (state_.job->hasWorkers()) {
-    evaluator_ =
-        std::make_unique<RankEvaluator>(*runner_, *state_.job, *reporter_, *failedRunPolicy_, earlier, &slotUse_);
+    state_.workers.emplace(*state_.job, config_.maxWorkerSilence, state_.clock);
+    evaluator_ = std::make_unique<RankEvaluator>(*runner_, *state_.job, *state_.workers, *reporter_, *failedRunPolicy_,
+                                                 earlier, &slotUse_);
   } else {
     evaluator_ = std::make_unique<LocalEvaluator>(*runner_, *reporter_, *failedRunPolicy_,
                                                   config_.simultaneousSimulations, earlier, &slotUse_);
@@ -441,6 +446,10 @@ void RunDriver::finish(const TaskOutcome& outcome) {
   }
   if (reporter_->replayedCount() > 0) {
     state_.log.line(fmt::format("{} of them were taken from the earlier run", reporter_->replayedCount()));
+  }
+  if (reporter_->lostRunCount() > 0) {
+    state_.log.line(fmt::format("{} made once more, as the worker that had it was lost",
+                                countText(static_cast<std::size_t>(reporter_->lostRunCount()), "evaluation")));
   }
   logFailures();
   if (state_.log.warningCount() > 0) {

@@ -56,6 +56,7 @@ void addFindings(const RunReporter& reporter, const ObjectiveAggregator& aggrega
   for (const auto& [kind, count] : reporter.failures().counts()) {
     record.failuresByKind.emplace_back(failureKindKey(kind), count.count);
   }
+  record.lostRuns = reporter.lostRunCount();
   record.scales.clear();
   if (aggregator.scaleLines().empty()) return;  // there is no scale, or it is not known
   for (std::size_t i = 0; i < objectives.size(); ++i) {

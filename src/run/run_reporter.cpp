@@ -67,6 +67,11 @@ void RunReporter::processesLeft(std::string_view text) {
   }
 }
 
+void RunReporter::runLost(std::string_view text) {
+  ++lostRunCount_;
+  state_.log.warning(text);
+}
+
 std::optional<std::string> RunReporter::processesLeftWarning() const {
   if (runsWithProcessesLeft_ <= 1) return std::nullopt;
   return fmt::format(

@@ -52,6 +52,7 @@ class RunReporter final : public EvaluationObserver {
   void warning(std::string_view text) override;
   void urgentWarning(std::string_view text) override;
   void processesLeft(std::string_view text) override;
+  void runLost(std::string_view text) override;
   void fileAbsent(const std::string& name, std::string_view text) override;
   void recordEvaluation(std::span<const double> set, const EvaluationResult& result) override;
   void recordRepeat(std::span<const double> set, const EvaluationResult& result, int original) override;
@@ -101,6 +102,8 @@ class RunReporter final : public EvaluationObserver {
   int replayedCount() const { return replayedCount_; }
   /// Evaluations that have the result of an earlier one of the same set.
   int repeatCount() const { return repeatCount_; }
+  /// Sets that were handed out once more, as the process that had them was lost.
+  int lostRunCount() const { return lostRunCount_; }
   const FailureSummary& failures() const { return failures_; }
 
  private:
@@ -146,6 +149,7 @@ class RunReporter final : public EvaluationObserver {
   int failedCount_ = 0;
   int replayedCount_ = 0;
   int repeatCount_ = 0;
+  int lostRunCount_ = 0;
   FailureSummary failures_;
   int firstSuccess_ = 0;  ///< with which others are compared
   /// By kind, evaluation and measure.

@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "common/clock.h"
+#include "evaluation/ranks/worker_watch.h"
 #include "platform/jobs/single_process.h"
 #include "run/progress/progress_reporter.h"
 #include "run/progress/run_log.h"
@@ -19,6 +20,7 @@ struct RunState {
   int mpiRank = -1;  ///< -1 without MPI, 0 the master, above 0 a worker
   int mpiProcessCount = 1;
   bool mpiInUse = false;
+  std::optional<WorkerWatch> workers;    ///< in a job that has workers, once the setup is read
   std::optional<double> workersStopped;  ///< when they were told to
   RunLog log;
   ProgressReporter progress{runTimeClock};

@@ -50,7 +50,8 @@ void work(Job& job, std::optional<MasterWatch>& watch) {
   std::vector<std::string> warnings;
   settings.warn = [&warnings](std::string_view text) { warnings.emplace_back(text); };
   ModelRunner runner(std::move(model), parameters, aggregator, launcher, settings);
-  runWorkerLoop(job, runner, *watch, std::exchange(warnings, {}));
+  LifeSigns signs(job, runTimeClock, config.maxWorkerSilence);
+  runWorkerLoop(job, runner, *watch, signs, std::exchange(warnings, {}));
 }
 
 void workOrReport(Job& job, std::optional<MasterWatch>& watch) {

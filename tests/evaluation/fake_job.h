@@ -2,6 +2,8 @@
 
 #include <deque>
 #include <functional>
+#include <optional>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -40,6 +42,9 @@ class FakeJob final : public Job {
     while (!othersLeave && !isEnough()) receive(1.0);
     return othersLeave;
   }
+  bool outlivesLosses() const override { return outlives; }
+  bool hasEnded(int rank) override { return ended.contains(rank); }
+  void leaveWithout(const std::set<int>& lost) override { leftWithout = lost; }
   void abort(int exitCode) override { throw Aborted{exitCode}; }
   void end(int) override {}
 
@@ -52,6 +57,9 @@ class FakeJob final : public Job {
   std::function<void(const Message&)> onSend;
   std::function<void(double)> onReceive;
   bool othersLeave = true;
+  bool outlives = false;
+  std::set<int> ended;
+  std::optional<std::set<int>> leftWithout;
   int finalisations = 0;
 
  private:

@@ -51,6 +51,9 @@ void tryInjectedFaults(bool isLong, FaultReport& report);
 /// Runs that are stopped, killed, or see the clock move.
 void tryInterruptions(bool isLong, FaultReport& report);
 
+/// Workers of MPI jobs that are killed, stopped and starved, under a launcher that lets the job go on.
+void tryLostRanks(bool isLong, FaultReport& report);
+
 /// Faults as the system itself makes them: full disks, forbidden files, limits of a process, files removed during the
 /// run. What needs rights that this process does not have is reported as skipped.
 void tryRealFaults(bool isLong, FaultReport& report);

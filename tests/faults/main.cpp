@@ -4,7 +4,7 @@
 //
 //   faults                       a fault a kind of file and call, for every build (some seconds)
 //   faults --long                every call and error, hundreds of interruptions (many minutes)
-//   faults [--long] GROUP ...    only these: injected, interruptions, real
+//   faults [--long] GROUP ...    only these: injected, interruptions, ranks, real
 
 #include <cstdio>
 #include <set>
@@ -19,6 +19,7 @@ int main(int argc, char** argv) {
   constexpr std::pair<std::string_view, void (*)(bool isLong, FaultReport& report)> kGroups[] = {
       {"injected", mirevo::testing::tryInjectedFaults},
       {"interruptions", mirevo::testing::tryInterruptions},
+      {"ranks", mirevo::testing::tryLostRanks},
       {"real", mirevo::testing::tryRealFaults}};
   std::set<std::string_view> wanted(argv + 1, argv + argc);
   const bool isLong = wanted.erase("--long") > 0;
@@ -27,6 +28,6 @@ int main(int argc, char** argv) {
     if (isAll || wanted.erase(name) > 0) tryAll(isLong, report);
   }
   if (wanted.empty()) return report.finish();
-  fmt::print(stderr, "Usage: faults [--long] [injected] [interruptions] [real]\n");
+  fmt::print(stderr, "Usage: faults [--long] [injected] [interruptions] [ranks] [real]\n");
   return 2;
 }

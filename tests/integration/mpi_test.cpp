@@ -190,7 +190,13 @@ TEST_F(Mpi, HoweverAJobIsEndedItLeavesNoProcess) {
       {"SIGTERM to mpirun", -1, -1, false, SIGTERM, 1, {terminated}},
       {"killed worker", -1, 1, false, -1, 128 + SIGKILL, {terminated, "signal 9"}},
       {"stopped worker", 1, -1, false, 0, 1, {cancelled, "no answer to the request to stop from worker"}},
-      {"lost worker", -1, 1, true, 0, 1, {cancelled, "no answer to the request to stop from worker"}},
+      {"stopped worker of a job that outlives it",
+       1,
+       -1,
+       true,
+       0,
+       1,
+       {cancelled, "no answer to the request to stop from worker"}},
       {"stopped master", 0, -1, false, 0, 1, {"aborted by worker"}}};
   for (const Way& way : ways) {
     SCOPED_TRACE(way.name);
@@ -218,6 +224,45 @@ TEST_F(Mpi, HoweverAJobIsEndedItLeavesNoProcess) {
     for (const int process : processes) EXPECT_TRUE(waitUntil([&] { return !isRunning(process); })) << process;
     for (const char* name : pidFiles) std::filesystem::remove(folder_ / name);
     std::filesystem::remove(folder_ / "first");
+  }
+}
+
+/// The first model that is started hangs, and its worker is lost; the second run of its set does not.
+TEST_F(Mpi, ALostWorkerCostsOneModelRun) {
+  const std::string setup = folder_.writeSetup({.option = 0, .scenarios = scenarios(12)});
+  ASSERT_EQ(runProgram({setup}).exitCode, 0) << log();
+  const std::string plain = withoutDates(folder_.read("basin.dat"));
+  folder_.useScript(
+      fmt::format("if mkdir '{0}/first' 2>/dev/null; then\n"
+                  "  echo $PPID >'{0}/worker.pid'\n  echo $$ >'{0}/model.pid'\n  exec {1} --sleep-ms 3600000\nfi",
+                  folder_.path(), MIREVO_TEST_MODEL));
+  folder_.editSetup("[SimultaneousSimulations]", "[SimultaneousSimulations]\n    MaxWorkerSilence = 3");
+  struct Way {
+    const char* name;
+    int signal;
+    bool outlivesRanks;
+    const char* why;
+  };
+  for (const Way& way :
+       {Way{"killed", SIGKILL, true, "its process has ended"},
+        Way{"stopped", SIGSTOP, true, "it has given no sign of life for 3 s"},
+        Way{"stopped, and nobody may be lost", SIGSTOP, false, "it has given no sign of life for 3 s"}}) {
+    SCOPED_TRACE(way.name);
+    RunningProgram job = startJob(3, {setup}, 1, way.outlivesRanks);
+    const int worker = folder_.waitForProcess("worker.pid");
+    const int model = folder_.waitForProcess("model.pid");
+    ::kill(worker, way.signal);
+    const ProgramResult result = job.wait(100.0);
+    EXPECT_FALSE(result.timedOut);
+    EXPECT_EQ(result.exitCode, 0) << result.error;
+    EXPECT_EQ(withoutDates(folder_.read("basin.dat")), plain);
+    EXPECT_THAT(log(), ::testing::ContainsRegex(
+                           fmt::format("Warning: Worker [12] on .* is lost: {}.*Evaluation No. ", way.why)));
+    EXPECT_THAT(log(), HasSubstr("\n1 evaluation made once more, as the worker that had it was lost\n"));
+    EXPECT_THAT(log(), EndsWith("\n\nNormal termination\n"));
+    EXPECT_THAT(folder_.read("basin_Run.dat"), HasSubstr("lostRuns\t1\n"));
+    for (const int process : {worker, model}) EXPECT_TRUE(waitUntil([&] { return !isRunning(process); })) << process;
+    for (const char* name : {"worker.pid", "model.pid", "first"}) std::filesystem::remove(folder_ / name);
   }
 }
 

@@ -12,19 +12,22 @@
 #include "evaluation/failed_run_policy.h"
 #include "evaluation/model_run.h"
 #include "evaluation/ranks/rank_messages.h"
+#include "evaluation/ranks/worker_watch.h"
 #include "platform/jobs/job.h"
 
 namespace mirevo {
 
-/// The master of a job with workers: hands one set at a time to each free worker, the lowest rank first.
+/// The master of a job with workers: hands one set at a time to each free worker, the lowest rank first. The set of a
+/// worker that is lost goes to the next free one, before all others; the first result counts.
 class RankEvaluator final : public Evaluator {
  public:
   /// `runner` has no slots here; it tells which sets cannot be run. beginWorkers() must have been called. `earlier`:
   /// evaluations that are not repeated; may be null, as `slotUse`. All must outlive the object.
-  RankEvaluator(ModelRunner& runner, Job& job, EvaluationObserver& observer, FailedRunPolicy& failedRuns,
-                EarlierEvaluations* earlier = nullptr, SlotUse* slotUse = nullptr);
+  RankEvaluator(ModelRunner& runner, Job& job, WorkerWatch& watch, EvaluationObserver& observer,
+                FailedRunPolicy& failedRuns, EarlierEvaluations* earlier = nullptr, SlotUse* slotUse = nullptr);
 
-  /// Also throws FatalError, with the worker's own message, after a fatal error on a worker.
+  /// Also throws FatalError, with the worker's own message, after a fatal error on a worker, and when all workers are
+  /// lost.
   std::vector<EvaluationResult> evaluateParameterSets(std::span<const ParameterSet> sets, DispatchMode mode) override;
   void submit(std::span<const ParameterSet> sets) override;
   EvaluationResult awaitFirst() override;
@@ -33,21 +36,34 @@ class RankEvaluator final : public Evaluator {
 
  private:
   struct Worker {
-    std::optional<ReadyMessage> place;    ///< host and process folder; empty until it is ready
-    std::optional<std::size_t> set;       ///< place in the ledger of the set that it runs
+    std::optional<ReadyMessage> place;  ///< host and process folder; empty until it is ready
+    std::optional<std::size_t> set;  ///< place in the ledger of the set that it runs, unless another's result counts
     std::optional<ResultMessage> answer;  ///< waits for the first successful run, see EvaluationLedger::judge()
     bool isGivenUp = false;               ///< its process folder cannot be used any more
+    bool isLate = false;                  ///< its set was put back
+    bool isRunning = false;               ///< it makes a model run, as far as is known
   };
 
   /// Waits for a message, takes the results that can be judged, and sends the next sets.
   void goOn();
   void startOnFreeWorkers();
-  /// Sends the next set; sets that cannot be run get their result at once and are skipped.
-  void startNext(int rank);
+  /// To be called when the state of the worker has changed.
+  void noteWhetherFree(int rank);
+  /// Sends the next set; sets that cannot be run get their result at once and are skipped. False when there is none.
+  bool startNext(int rank);
   void handle(const Message& message);
   void takeResult(int rank, ResultMessage message);
-  /// Throws FatalError if the worker was given no set, or has sent its result.
-  void requireSet(int rank);
+  /// The model run of the worker has ended, or nobody will hear of its end.
+  void noteEnd(int rank);
+  /// The set that the worker has answered. Throws FatalError if it has none.
+  WorkerWatch::Held takeHeld(int rank);
+  /// The worker, which was lost, has a result. False if another one was first; others that run the set are now late.
+  bool isFirst(int rank);
+  /// Puts the sets of workers that are lost back. Throws FatalError when no worker is left.
+  void passOnLost();
+  void loseWorker(int rank);
+  /// Throws FatalError.
+  [[noreturn]] void failWithoutWorkers() const;
   /// Finishes the answers that can be judged.
   void finishAnswered();
   void finish(Worker& worker, int rank);
@@ -63,22 +79,30 @@ class RankEvaluator final : public Evaluator {
 
   ModelRunner& runner_;
   Job& job_;
+  WorkerWatch& watch_;
   EvaluationObserver& observer_;
   EvaluationLedger ledger_;
   std::vector<Worker> workers_;  ///< of ranks 1, 2, ...
+  std::set<int> free_;           ///< ranks that can be given a set
+  std::set<int> answered_;       ///< ranks with an answer that waits
+  std::set<int> late_;           ///< ranks whose set was put back
   std::set<std::string> warningsOfFolders_;
 };
 
 /// Sends `message` to every worker, in rank order. A job of one process has none.
 void beginWorkers(Job& job, const BeginMessage& message);
 
-/// Tells every worker, in rank order, to stop.
-void stopWorkers(Job& job);
+/// Tells every worker but those, in rank order, to stop.
+void stopWorkers(Job& job, const std::set<int>& lost = {});
 
-/// Waits for the farewells of all workers, at most until `isEnough`, which is called several times a second, and
-/// returns the ranks of those that have said none. A worker may fail after the last result, while it still copies the
-/// base folder; `warn` is called for each such failure. Other messages are dropped.
-std::set<int> awaitFarewells(Job& job, const std::function<bool()>& isEnough,
+/// Waits for the farewells of all workers but those that are lost, at most until `isEnough`, which is called several
+/// times a second, and returns the ranks of those that have said none, the lost ones among them. A worker may fail
+/// after the last result, while it still copies the base folder; `warn` is called for each such failure. Other messages
+/// are dropped.
+std::set<int> awaitFarewells(Job& job, const std::set<int>& lost, const std::function<bool()>& isEnough,
                              const std::function<void(const std::string&)>& warn);
+
+/// Ends the part of all workers but those in a job that outlives losses, when they have said their farewells.
+void dismissWorkers(Job& job, const std::set<int>& missing);
 
 }  // namespace mirevo

@@ -20,11 +20,27 @@ namespace mirevo {
 ///     | keep folder ----------------> |  after a failed run, where its folder is evidence to keep
 ///     | <------------------- given up  |  in place of a result: the set is another worker's, as the model has damaged
 ///     |                                |  this one's folder once too often; from now on it only waits for stop
+///     | <--------------------- alive   |  several times within the time after which a silent worker is lost, while
+///     |                                |  the model runs and its results are read
 ///     | stop ------------------------> |  at any time; ends its model's processes
 ///     | <------------------ farewell   |  then both leave the job
+///     | leave -----------------------> |  before that in a job that outlives losses, in which they do not meet
 ///
-/// A worker that meets a fatal error sends `failure` at any time and waits for `stop`.
-enum class RankMessage : int { begin = 1, set, stop, ready, result, failure, farewell, keepFolder, givenUp };
+/// A worker that meets a fatal error sends `failure` at any time and waits for `stop`. The set of a worker that is lost
+/// goes to another one (WorkerWatch); the first result counts, and later ones are dropped.
+enum class RankMessage : int {
+  begin = 1,
+  set,
+  stop,
+  ready,
+  result,
+  failure,
+  farewell,
+  keepFolder,
+  givenUp,
+  alive,
+  leave
+};
 
 /// The setup file as the master read it, so that all ranks use the same text.
 struct BeginMessage {

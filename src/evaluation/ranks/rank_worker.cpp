@@ -22,11 +22,19 @@ void sendToMaster(Job& job, RankMessage tag, std::string content) {
   job.send(kMaster, static_cast<int>(tag), std::move(content));
 }
 
+/// Without it the job would wait for its end for ever.
+void requireMaster(Job& job) {
+  if (!job.hasEnded(kMaster)) return;
+  fatalError(kCommunicationFailed, "the process of the master has ended; Restart = 1 goes on with what it has written");
+}
+
 Message await(Job& job, MasterWatch* watch) {
+  const bool looks = watch != nullptr || job.outlivesLosses();
   while (true) {
-    if (auto message = job.receive(watch != nullptr ? MasterWatch::kLookSeconds : kIdleSeconds)) {
+    if (auto message = job.receive(looks ? MasterWatch::kLookSeconds : kIdleSeconds)) {
       return std::move(*message);
     }
+    requireMaster(job);
     if (watch != nullptr) watch->requireAnswerWithin(MasterWatch::kAnswerSeconds);
   }
 }
@@ -45,38 +53,53 @@ bool isExecuting(ModelRunner& runner) {
 
 bool isStopped(Job& job, MasterWatch& watch) {
   const auto arrived = job.receive(0.0);
+  if (!arrived) requireMaster(job);
   if (!arrived) watch.requireAnswerWithin(MasterWatch::kAnswerSeconds);
   if (arrived && arrived->tag != static_cast<int>(RankMessage::stop)) refuse(*arrived);
   return arrived.has_value();
 }
 
 /// Runs the model with one set; empty when the master sends stop in the meantime.
-std::optional<ResultMessage> runModel(Job& job, ModelRunner& runner, const SetMessage& message, MasterWatch& watch) {
+std::optional<ResultMessage> runModel(Job& job, ModelRunner& runner, const SetMessage& message, MasterWatch& watch,
+                                      LifeSigns& signs) {
+  signs.begin();
   runner.setStandard(message.standard);
   if (auto failure = runner.prepareModelRun(message.set, kSlot))
     return ResultMessage{runner.failedResult(*failure), {}, {}};
   while (isExecuting(runner)) {
     runner.launcher().waitForChange(kBusyPollSeconds);
+    // An item that ended while this process was stopped has kept the next one waiting.
+    if (const double gap = signs.look(); gap >= LifeSigns::kLongGap) runner.launcher().excludeTime(gap);
     if (!isStopped(job, watch)) continue;
     runner.launcher().haltProcesses();
     return std::nullopt;
   }
   try {
-    const auto look = [&job, &watch] {
+    const auto look = [&job, &watch, &signs] {
+      signs.look();
       if (isStopped(job, watch)) throw RunCancelled();
     };
-    ResultMessage answer{runner.collect(kSlot, look), runner.launcher().leftBehind(kSlot), {}};
-    runner.keepOutputFiles(kSlot, message.number, answer.result, message.repeatedMeasures);
-    return answer;
+    return ResultMessage{runner.collect(kSlot, look), runner.launcher().leftBehind(kSlot), {}};
   } catch (const RunCancelled&) {
     runner.launcher().haltProcesses();
     return std::nullopt;
   }
 }
 
+/// A worker that was itself stopped, or kept waiting, may have found that the time of the run was over, which is no
+/// fault of the run: it is made once more.
+std::optional<ResultMessage> runUndisturbed(Job& job, ModelRunner& runner, const SetMessage& message,
+                                            MasterWatch& watch, LifeSigns& signs) {
+  auto answer = runModel(job, runner, message, watch, signs);
+  if (answer && !answer->result.ok() && signs.wasInterrupted()) answer = runModel(job, runner, message, watch, signs);
+  if (answer) runner.keepOutputFiles(kSlot, message.number, answer->result, message.repeatedMeasures);
+  return answer;
+}
+
 }  // namespace
 
-void runWorkerLoop(Job& job, ModelRunner& runner, MasterWatch& watch, std::vector<std::string> warnings) {
+void runWorkerLoop(Job& job, ModelRunner& runner, MasterWatch& watch, LifeSigns& signs,
+                   std::vector<std::string> warnings) {
   sendToMaster(
       job, RankMessage::ready,
       encode(ReadyMessage{hostName(), runner.launcher().getProcessFolder(kSlot), std::exchange(warnings, {})}));
@@ -98,7 +121,7 @@ void runWorkerLoop(Job& job, ModelRunner& runner, MasterWatch& watch, std::vecto
                                          damage->isFinal}));
       continue;
     }
-    auto result = runModel(job, runner, decodeSet(message.content), watch);
+    auto result = runUndisturbed(job, runner, decodeSet(message.content), watch, signs);
     if (!result) return;
     result->warnings = std::exchange(warnings, {});
     sendToMaster(job, RankMessage::result, encode(*result));
@@ -114,6 +137,11 @@ std::optional<BeginMessage> awaitBegin(Job& job) {
 
 void sayFarewell(Job& job, MasterWatch* watch) {
   sendToMaster(job, RankMessage::farewell, {});
+  if (job.outlivesLosses()) {
+    while (await(job, watch).tag != static_cast<int>(RankMessage::leave)) {
+    }
+    return job.leaveWithout({});
+  }
   job.finalise([watch] {
     if (watch != nullptr) watch->requireAnswerWithin(MasterWatch::kClosingSeconds);
     return false;

@@ -3,6 +3,7 @@
 #include <functional>
 #include <memory>
 #include <optional>
+#include <set>
 #include <string>
 #include <string_view>
 
@@ -49,6 +50,21 @@ class Job {
   /// it, when `isEnough`, which is called many times a second, says that it has waited long enough. Throws FatalError
   /// when the job's communication is broken.
   virtual bool finalise(const std::function<bool()>& isEnough) = 0;
+
+  /// Whether the others go on when a process of the job is lost, as the user has asked the launcher. Such a job is left
+  /// by leaveWithout(), never by finalise(), which would wait for those that are lost.
+  virtual bool outlivesLosses() const { return false; }
+
+  /// Whether that process is known to have ended, which is so in a job that outlives losses, and only of processes on
+  /// this machine that have sent a message or received one.
+  virtual bool hasEnded(int rank) {
+    static_cast<void>(rank);
+    return false;
+  }
+
+  /// For such a job: those processes are ended where that can be done, and end() will leave without them. Messages can
+  /// be sent until then. The others must come to leave, too.
+  virtual void leaveWithout(const std::set<int>& lost) { static_cast<void>(lost); }
 
   /// Ends every process of the job at once, for when one of them does not answer. Does not return.
   virtual void abort(int exitCode) = 0;

@@ -40,6 +40,7 @@ constexpr std::string_view kRepeats = "repeats";
 constexpr std::string_view kAnalysed = "analysedEvaluations";
 /// With the key of the kind, or the name of the objective function, behind it.
 constexpr std::string_view kFailedBy = "failed.";
+constexpr std::string_view kLostRuns = "lostRuns";
 constexpr std::string_view kSigma = "sigma.";
 constexpr std::string_view kMu = "mu.";
 constexpr std::string_view kLines = "lines.";  ///< with the name of the file behind it
@@ -108,6 +109,7 @@ void takeRow(const std::string& name, const std::string& value, RunRecord& recor
   if (name == key::kRepeats) record.repeats = number().value_or(0);
   if (name == key::kAnalysed) record.analysed = number();
   if (auto kind = nameBehind(key::kFailedBy, name)) record.failuresByKind.emplace_back(*kind, number().value_or(0));
+  if (name == key::kLostRuns) record.lostRuns = number().value_or(0);
   if (auto objective = nameBehind(key::kSigma, name)) scaleOf(record, *objective).sigma = real();
   if (auto objective = nameBehind(key::kMu, name)) scaleOf(record, *objective).mu = real();
   if (auto file = nameBehind(key::kLines, name)) record.lines.emplace_back(*file, number().value_or(0));
@@ -151,6 +153,7 @@ std::string runRecordText(const RunRecord& record, const std::vector<std::string
     if (record.failed) rows.addCount(key::kFailed, *record.failed);
     for (const auto& [kind, count] : record.failuresByKind) rows.addCount(joined(key::kFailedBy, kind), count);
     if (record.repeats > 0) rows.addCount(key::kRepeats, record.repeats);
+    if (record.lostRuns > 0) rows.addCount(key::kLostRuns, record.lostRuns);
     if (record.analysed) rows.addCount(key::kAnalysed, *record.analysed);
     for (const RunRecord::Scale& scale : record.scales) {
       rows.add(joined(key::kSigma, scale.objective), scale.sigma);

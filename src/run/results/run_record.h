@@ -45,6 +45,7 @@ struct RunRecord {
   std::optional<int> failed;
   int repeats = 0;  ///< evaluations that have the result of an earlier one, without a model run
   std::vector<std::pair<std::string, int>> failuresByKind;
+  int lostRuns = 0;  ///< model runs that were made again, as the worker of the job that had them was lost
   /// Of an analysis that did not come to its end, the evaluations of which it gives statistics; without any, nothing.
   std::optional<int> analysed;
   /// Of one objective function, on the way to the aggregate.

@@ -57,8 +57,9 @@ struct RunConfig {
   bool usesMpiWorkers = false;  ///< then `simultaneousSimulations` is 1, for each worker
   bool useSingleThread = false;
   bool linksReadOnlyFiles = false;
-  std::string processFolder;       ///< folder for the process folders; empty: that of the setup
-  double maxSimulationTime = 0.0;  ///< longest time of a model run, s; 0: no limit
+  std::string processFolder;        ///< folder for the process folders; empty: that of the setup
+  double maxSimulationTime = 0.0;   ///< longest time of a model run, s; 0: no limit
+  double maxWorkerSilence = 600.0;  ///< of a worker of a job that has a set, s; 0: no limit
 
   RestartMode restart = RestartMode::startAfresh;
   bool reuseResults = true;                   ///< as the setup has it, see reusesResults()

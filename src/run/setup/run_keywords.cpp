@@ -122,6 +122,16 @@ const SettingSection<RunConfig>& slotsSection() {
              .unit = "s",
              .meaning = "Longest time of a model run, with the reading of its results; one that takes longer is ended "
                         "and has failed. 0: no limit.",
+             .bearsOnResults = kNotOfResults}),
+        setting<&RunConfig::maxWorkerSilence>(
+            {.name = "MaxWorkerSilence",
+             .defaultValue = "600.0",
+             .range = kNonNegative,
+             .refusal = "Error: Invalid maximum silence of a worker",
+             .unit = "s",
+             .meaning =
+                 "In an MPI job: a worker that has a parameter set gives signs of life; after so long without one "
+                 "its set goes to another worker. 0: never.",
              .bearsOnResults = kNotOfResults})}}};
   return section;
 }

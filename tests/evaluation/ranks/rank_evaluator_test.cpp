@@ -1,5 +1,6 @@
 #include "evaluation/ranks/rank_evaluator.h"
 
+#include <algorithm>
 #include <cmath>
 
 #include "evaluation/evaluation_fixture.h"
@@ -16,13 +17,15 @@ class RankEvaluatorTest : public EvaluationTest {
   RankEvaluatorTest() : launcher_([](int, const std::string&) { return FakeLauncher::Batch{}; }) {
     job_.onSend = [this](const Message& message) {
       if (message.tag != static_cast<int>(RankMessage::set)) return;
-      running_[message.rank] = decodeSet(message.content).set.at(0);
+      const SetMessage given = decodeSet(message.content);
+      running_[message.rank] = given.set.at(0);
+      given_.emplace_back(message.rank, given.number);
     };
   }
   RankEvaluator& makeMaster(int planned = 100) {
     makeRunner(launcher_, 0);
     failedRuns_ = std::make_unique<FailedRunPolicy>(planned, foldersToKeep_);
-    master_ = std::make_unique<RankEvaluator>(*runner_, job_, observer_, *failedRuns_, earlier_.get());
+    master_ = std::make_unique<RankEvaluator>(*runner_, job_, watch_, observer_, *failedRuns_, earlier_.get());
     return *master_;
   }
   void becomeReady(int rank, const std::vector<std::string>& warnings = {}) {
@@ -48,10 +51,15 @@ class RankEvaluatorTest : public EvaluationTest {
     };
   }
 
+  static constexpr double kLimit = 10.0;
+
   FakeLauncher launcher_;
   FakeJob job_{3};
-  std::map<int, double> running_;    ///< the set's value, by rank
-  std::vector<MeasurePairs> pairs_;  ///< of each answer
+  double now_ = 0.0;
+  WorkerWatch watch_{job_, kLimit, [this] { return now_; }};
+  std::map<int, double> running_;           ///< the set's value, by rank
+  std::vector<std::pair<int, int>> given_;  ///< rank and evaluation of all that was handed out
+  std::vector<MeasurePairs> pairs_;         ///< of each answer
   std::unique_ptr<RankEvaluator> master_;
 };
 
@@ -184,13 +192,152 @@ TEST_F(RankEvaluatorTest, StoppingGoesInRankOrderAndEndsWithTheLastFarewell) {
   const auto warn = [&](const std::string& text) { warnings.push_back(text); };
   const auto isEnough = [] { return true; };
   stopWorkers(job_);
-  EXPECT_THAT(awaitFarewells(job_, isEnough, warn), IsEmpty());
+  EXPECT_THAT(awaitFarewells(job_, {}, isEnough, warn), IsEmpty());
   EXPECT_THAT(warnings, ElementsAre("Worker 2 met an error that no evaluation depended on: too late\nNo space left"));
   ASSERT_EQ(job_.sent.size(), 2U);
   EXPECT_EQ(job_.sent[0].rank, 1);
   EXPECT_EQ(job_.sent[1].tag, static_cast<int>(RankMessage::stop));
   job_.deliver(1, RankMessage::farewell, {});
-  EXPECT_THAT(awaitFarewells(job_, isEnough, warn), ElementsAre(2));
+  EXPECT_THAT(awaitFarewells(job_, {}, isEnough, warn), ElementsAre(2));
+}
+
+TEST_F(RankEvaluatorTest, NobodyWaitsForWorkersThatAreLost) {
+  const auto never = [] { return false; };
+  job_.ended = {2};
+  EXPECT_THAT(awaitFarewells(job_, {1}, never, nullptr), ElementsAre(1, 2));
+  stopWorkers(job_, {1});
+  dismissWorkers(job_, {2});
+  ASSERT_EQ(job_.sent.size(), 2U);
+  EXPECT_EQ(job_.sent[0].rank, 2);
+  EXPECT_EQ(job_.sent[1].rank, 1);
+  EXPECT_EQ(job_.sent[1].tag, static_cast<int>(RankMessage::leave));
+}
+
+/// What becomes of the first worker, which has the first of four sets, and whether its own result comes, too.
+struct LossCase {
+  const char* name;
+  bool ends;           ///< its process; otherwise it is silent
+  double comesBackAt;  ///< with its result, s; 0: never
+  std::vector<std::pair<int, int>> given;
+  std::vector<std::string> says;
+};
+
+class LossTest : public RankEvaluatorTest, public testing::WithParamInterface<LossCase> {};
+
+// The other worker takes 4 s for each set, and gives signs of life.
+TEST_P(LossTest, CostsOneModelRun) {
+  const LossCase& loss = GetParam();
+  RankEvaluator& master = makeMaster();
+  becomeReady(1);
+  becomeReady(2);
+  double begun = 0.0;
+  bool hasComeBack = false;
+  job_.onReceive = [&](double) {
+    if (!job_.arriving.empty()) return;
+    now_ += 0.25;
+    ASSERT_LT(now_, 200.0);
+    if (loss.ends && now_ > 1.0) job_.ended = {1};
+    job_.deliver(2, RankMessage::alive, {});
+    if (loss.comesBackAt > 0.0 && now_ >= loss.comesBackAt && running_.contains(1)) {
+      hasComeBack = true;
+      answer(1);
+    }
+    if (running_.contains(2) && now_ - begun >= 4.0) {
+      begun = now_;
+      answer(2);
+    }
+  };
+  EXPECT_THAT(measuresOf(evaluate(master, {4.0, 2.0, 3.0, 6.0, 7.0})), ElementsAre(3.0, 1.0, 2.0, 5.0, 6.0));
+  EXPECT_EQ(hasComeBack, loss.comesBackAt > 0.0);
+  EXPECT_EQ(given_, loss.given);
+  EXPECT_THAT(measuresOf(evaluate(master, std::vector(20, 2.0))), testing::Each(1.0))
+      << "of what runs on, nothing counts";
+  EXPECT_EQ(failedRuns_->failedCount(), 0);
+  for (const std::string& text : loss.says) EXPECT_THAT(observer_.events, testing::Contains(HasSubstr(text)));
+  const auto records = std::count_if(observer_.events.begin(), observer_.events.end(),
+                                     [](const std::string& event) { return event.starts_with("record "); });
+  EXPECT_EQ(records, 25);
+}
+
+const LossCase kLosses[] = {
+    {"Ended",
+     true,
+     0.0,
+     {{1, 1}, {2, 2}, {2, 1}, {2, 3}, {2, 4}, {2, 5}},
+     {"warning: Worker 1 on node is lost: its process has ended. Evaluation No. 1, which it had for "}},
+    {"Silent",
+     false,
+     0.0,
+     {{1, 1}, {2, 2}, {2, 3}, {2, 4}, {2, 1}, {2, 5}},
+     {"warning: Worker 1 on node is lost: it has given no sign of life for 10 s. Evaluation No. 1, which it had for "}},
+    // Before the set that was put back is taken again: it is the other one's next but one.
+    {"BackAtOnce", false, 10.5, {{1, 1}, {2, 2}, {2, 3}, {2, 4}, {1, 5}}, {"Worker 1 on node answers again"}},
+    {"FirstAllTheSame",
+     false,
+     13.0,
+     {{1, 1}, {2, 2}, {2, 3}, {2, 4}, {2, 1}, {1, 5}},
+     {"The result of evaluation No. 1 from worker 2 on node is dropped"}},
+    {"Late",
+     false,
+     17.0,
+     {{1, 1}, {2, 2}, {2, 3}, {2, 4}, {2, 1}, {2, 5}},
+     {"The result of evaluation No. 1 from worker 1 on node is dropped: another worker had it first"}}};
+
+INSTANTIATE_TEST_SUITE_P(Cases, LossTest, testing::ValuesIn(kLosses), [](const auto& loss) { return loss.param.name; });
+
+TEST_F(RankEvaluatorTest, TheMastersOwnAbsenceIsNoSilenceOfItsWorkers) {
+  RankEvaluator& master = makeMaster();
+  becomeReady(1);
+  becomeReady(2);
+  int waits = 0;
+  job_.onReceive = [&](double) {
+    if (!job_.arriving.empty() || running_.empty()) return;
+    now_ += 3600.0;
+    if (++waits % 4 == 0) answer(waits % 8 == 0 ? running_.begin()->first : running_.rbegin()->first);
+  };
+  evaluate(master, std::vector(6, 2.0));
+  EXPECT_THAT(watch_.lost(), IsEmpty());
+  EXPECT_EQ(given_.size(), 6U);
+}
+
+TEST_F(RankEvaluatorTest, WithoutALimitSilenceIsNoLoss) {
+  WorkerWatch watch(job_, 0.0, [this] { return now_; });
+  watch.handOut(1, 1);
+  for (; now_ < 1000.0; now_ += 0.5) EXPECT_THAT(watch.findLost(), IsEmpty());
+  job_.ended = {1};
+  EXPECT_THAT(watch.findLost(), ElementsAre(1));
+}
+
+TEST_F(RankEvaluatorTest, ARunWhoseWorkersAreAllLostEnds) {
+  RankEvaluator& master = makeMaster();
+  becomeReady(1);
+  becomeReady(2);
+  job_.onReceive = [&](double) {
+    now_ += 0.25;
+    if (now_ > 1.0) job_.ended = {2};
+    if (now_ < 3.0 && job_.arriving.empty() && running_.contains(2)) answer(2);
+  };
+  EXPECT_EQ(refusalOf([&] { evaluate(master, std::vector(20, 2.0)); }),
+            "Error: All workers of the job are lost\nworker 1 on node: it gives no sign of life\n"
+            "worker 2 on node: its process has ended\nRestart = 1 goes on with what has been evaluated");
+  EXPECT_GE(master.takeUnfinished().results.size(), 1U) << "what was evaluated is kept";
+}
+
+TEST_F(RankEvaluatorTest, AResultThatWaitsIsKeptWhenItsWorkerIsLost) {
+  RankEvaluator& master = makeMaster();
+  becomeReady(1);
+  becomeReady(2);
+  pairs_ = {{.count = 5}};
+  pairs_[0].file.endsLine = false;
+  job_.onReceive = [&](double) {
+    if (!job_.arriving.empty()) return;
+    now_ += 0.25;
+    if (running_.contains(2)) return answer(2);  // waits for the first set's
+    job_.ended = {2};
+    if (now_ > 2.0 && running_.contains(1)) answer(1);
+  };
+  EXPECT_THAT(measuresOf(evaluate(master, {2.0, 4.0, 6.0})), ElementsAre(1.0, 3.0, 5.0));
+  EXPECT_THAT(given_, ElementsAre(testing::Pair(1, 1), testing::Pair(2, 2), testing::Pair(1, 3)));
 }
 
 TEST_F(RankEvaluatorTest, TheWorkerOfAnEarlyFailureIsToldToKeepItsFolder) {

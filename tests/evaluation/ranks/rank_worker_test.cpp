@@ -12,7 +12,8 @@ namespace {
 class RankWorkerTest : public EvaluationTest {
  protected:
   RankWorkerTest() : launcher_(batch) {
-    job_.onSend = [this](const Message&) {
+    job_.onSend = [this](const Message& message) {
+      if (message.tag == static_cast<int>(RankMessage::alive)) return;
       if (std::ssize(sets_) == keepAt_) job_.deliver(0, RankMessage::keepFolder, encode(KeepFolderMessage{17}));
       if (sets_.empty()) {
         job_.deliver(0, RankMessage::stop, {});
@@ -49,12 +50,13 @@ class RankWorkerTest : public EvaluationTest {
   std::deque<double> sets_;
   double now_ = 0.0;
   MasterWatch watch_{folder_ / "run._kill_", [this] { return now_; }, [this] { job_.abort(1); }};
+  LifeSigns signs_{job_, [this] { return now_; }, 8.0};
   int keepAt_ = -1;  ///< the sets left when the folder of the last run is to be kept
 };
 
 TEST_F(RankWorkerTest, AnswersEachSetUntilItIsToldToStop) {
   sets_ = {2.0, 9.5, 2.0};
-  runWorkerLoop(job_, *runner_, watch_);
+  runWorkerLoop(job_, *runner_, watch_, signs_);
   ASSERT_THAT(sentTags(),
               ElementsAre(RankMessage::ready, RankMessage::result, RankMessage::result, RankMessage::result));
   EXPECT_EQ(decodeReady(job_.sent[0].content).processFolder, folder_ / "run_Process1");
@@ -71,7 +73,7 @@ TEST_F(RankWorkerTest, KeepsTheFolderOfItsLastRunWhereTheMasterSaysSo) {
   makeRunner(launcher_, 1);
   sets_ = {2.0, 3.0};
   keepAt_ = 1;
-  runWorkerLoop(job_, *runner_, watch_);
+  runWorkerLoop(job_, *runner_, watch_, signs_);
   EXPECT_THAT(folder_.read("run_Failed17/parameters.txt"), EndsWith(" 2\n"));
   EXPECT_THAT(sentTags(), ElementsAre(RankMessage::ready, RankMessage::result, RankMessage::result));
 }
@@ -90,7 +92,7 @@ TEST_F(RankWorkerTest, AWarningIsToldOnceWithTheNextResultThere) {
   makeRunner(launcher, 1);
   sets_ = {2.0, 2.0, 2.0, 2.0};
   keepAt_ = 2;
-  runWorkerLoop(job_, *runner_, watch_);
+  runWorkerLoop(job_, *runner_, watch_, signs_);
   ASSERT_EQ(job_.sent.size(), 5U);
   const auto absent = [this](std::size_t set) { return decodeResult(job_.sent.at(set).content).result.absentFiles; };
   EXPECT_THAT(absent(1).at(0).reason, HasSubstr("often.txt was not kept: the model run did not write it"));
@@ -110,11 +112,62 @@ TEST_F(RankWorkerTest, AFolderThatIsDamagedAgainIsToldInPlaceOfAResult) {
   });
   makeRunner(launcher, 1);
   sets_ = {2.0, 2.0, 2.0};
-  runWorkerLoop(job_, *runner_, watch_);
+  runWorkerLoop(job_, *runner_, watch_, signs_);
   ASSERT_THAT(sentTags(),
               ElementsAre(RankMessage::ready, RankMessage::result, RankMessage::result, RankMessage::givenUp));
   EXPECT_THAT(workerWarningsOf(2), ElementsAre(HasSubstr("was made anew")));
   EXPECT_EQ(decodeGivenUp(job_.sent[3].content).what, "Unable to open " + (folder_ / "run_Process1/parameters.txt"));
+}
+
+TEST_F(RankWorkerTest, GivesSignsOfLifeWhileItsModelRuns) {
+  LifeSigns signs(
+      job_, [this] { return launcher_.now; }, 16.0);
+  sets_ = {2.0};
+  runWorkerLoop(job_, *runner_, watch_, signs);  // ten seconds
+  EXPECT_THAT(sentTags(), ElementsAre(RankMessage::ready, RankMessage::alive, RankMessage::alive, RankMessage::alive,
+                                      RankMessage::alive, RankMessage::result));
+}
+
+TEST_F(RankWorkerTest, ARunWhoseTimeWasOverWhenItsWorkerWasStoppedIsMadeOnceMore) {
+  for (const bool isStopped : {true, false}) {
+    SCOPED_TRACE(isStopped);
+    FakeLauncher launcher([](int start, const std::string&) {
+      FakeLauncher::Batch batch{.seconds = 5.0, .write = [](const std::string& folder) {
+                                  std::ofstream(folder + "/simulated.csv") << series(2.0);
+                                }};
+      if (start == 1) batch.failure = {BatchFailure::Kind::timedOut, 0, "too long"};
+      return batch;
+    });
+    bool isOver = !isStopped;
+    launcher.onWait = [&] {
+      if (!std::exchange(isOver, true)) launcher.now += 30.0;
+    };
+    LifeSigns signs(
+        job_, [&] { return launcher.now; }, 0.0);
+    makeRunner(launcher, 1);
+    job_.sent.clear();
+    sets_ = {2.0};
+    runWorkerLoop(job_, *runner_, watch_, signs);
+    EXPECT_EQ(launcher.starts, isStopped ? 2 : 1);
+    EXPECT_EQ(decodeResult(job_.sent.at(1).content).result.ok(), isStopped);
+  }
+}
+
+TEST_F(RankWorkerTest, InAJobThatOutlivesLossesItWaitsForItsMasterAndNobodyElse) {
+  job_.outlives = true;
+  job_.othersLeave = false;
+  job_.onSend = nullptr;
+  job_.deliver(0, RankMessage::leave, {});
+  sayFarewell(job_, &watch_);
+  EXPECT_THAT(sentTags(), ElementsAre(RankMessage::farewell));
+  EXPECT_EQ(job_.leftWithout, std::set<int>{});
+  EXPECT_EQ(job_.finalisations, 0);
+
+  job_.onReceive = [this](double) {
+    if (now_ += 0.5; now_ > 60.0) job_.ended = {0};
+  };
+  EXPECT_THAT(refusalOf([&] { runWorkerLoop(job_, *runner_, watch_, signs_); }),
+              StartsWith("Error: MPI communication failed\nthe process of the master has ended"));
 }
 
 TEST_F(RankWorkerTest, StopEndsAModelThatRuns) {
@@ -122,7 +175,7 @@ TEST_F(RankWorkerTest, StopEndsAModelThatRuns) {
   job_.onReceive = [this](double) {
     if (launcher_.starts == 3 && launcher_.now > 25.0) job_.deliver(0, RankMessage::stop, {});
   };
-  runWorkerLoop(job_, *runner_, watch_);
+  runWorkerLoop(job_, *runner_, watch_, signs_);
   EXPECT_EQ(launcher_.halts, 1);
   EXPECT_EQ(launcher_.runningCount(), 0);
   EXPECT_LE(launcher_.now, 25.5);  // it listens often
@@ -152,7 +205,7 @@ TEST_F(RankWorkerTest, AKillFileThatTheMasterDoesNotAnswerEndsTheJob) {
     try {
       if (wait == Wait::forStop) reportFailure(job_, {"why", {}}, &watch_);
       if (wait == Wait::forTheOthers) sayFarewell(job_, &watch_);
-      if (wait < Wait::forStop) runWorkerLoop(job_, *runner_, watch_);
+      if (wait < Wait::forStop) runWorkerLoop(job_, *runner_, watch_, signs_);
       ADD_FAILURE() << "it went on";
     } catch (const FakeJob::Aborted& aborted) {
       EXPECT_EQ(aborted.exitCode, 1);

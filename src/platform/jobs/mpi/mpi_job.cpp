@@ -6,6 +6,7 @@
 #include <functional>
 #include <list>
 #include <optional>
+#include <set>
 #include <string>
 #include <string_view>
 #include <unistd.h>
@@ -18,6 +19,7 @@
 #include "common/clock.h"
 #include "common/fatal_error.h"
 #include "platform/jobs/job_launcher.h"
+#include "platform/jobs/mpi/near_processes.h"
 #include "platform/jobs/mpi_module.h"
 
 namespace mirevo {
@@ -34,6 +36,20 @@ constexpr double kLateSteepness = 1.0 / 200.0;
 
 /// Time for the launcher to take note that this process aborts the job.
 constexpr unsigned kAbortSeconds = 2;
+/// Longest time for messages to be taken by their receivers when a job is left that outlives losses.
+constexpr double kLastMessagesSeconds = 2.0;
+/// Longest time for a process to end that is killed, and time for the launcher to take note of it.
+constexpr double kEndSeconds = 1.0;
+constexpr double kNoticeSeconds = 0.1;
+/// Longest time for MPI to finalise in such a job: it may wait for processes that are lost, also for some that have
+/// ended. The second is for a job of which the master knows that it has lost some.
+constexpr unsigned kFinaliseSeconds = 10;
+constexpr unsigned kFinaliseWithoutSomeSeconds = 2;
+/// Longest time for MPI to begin in such a job: it waits for ever for a process that is lost meanwhile.
+constexpr unsigned kInitialiseSeconds = 300;
+
+/// Tag of the messages by which processes introduce themselves; those of the job's user are above it.
+constexpr int kIntroduction = 0;
 
 double napLength(double waited) {
   const double length = std::min(waited * kSteepness, std::max(kPlateau, waited * kLateSteepness));
@@ -56,6 +72,12 @@ std::string errorText(int code) {
   return {text.data(), static_cast<std::size_t>(length)};
 }
 
+/// As mpirun sees it: it starts a daemon on each of its nodes.
+bool isJobOnOneNode(int processCount) {
+  const char* count = std::getenv("OMPI_COMM_WORLD_LOCAL_SIZE");
+  return count != nullptr && std::atoi(count) == processCount;
+}
+
 /// mpirun ends all processes, and then itself with 1.
 void endLauncher() {
   if (const pid_t launcher = mpirunProcess(); launcher > 0) ::kill(launcher, SIGTERM);
@@ -64,6 +86,26 @@ void endLauncher() {
 void check(int code, std::string_view call) {
   if (code == MPI_SUCCESS) return;
   fatalError(kCommunicationFailed, fmt::format("{}: {}", call, errorText(code)));
+}
+
+/// For when MPI does not come to its end: what the process then ends with, the processes that would keep the launcher
+/// from ending, or null, and the launcher to be ended, or 0.
+int exitCodeOfLeaving = 0;
+const NearProcesses* keepersOfLeaving = nullptr;
+pid_t launcherOfLeaving = 0;
+
+void leaveFromSignal(int) {
+  if (keepersOfLeaving != nullptr) keepersOfLeaving->killAll();
+  if (launcherOfLeaving > 0) ::kill(launcherOfLeaving, SIGTERM);
+  ::_exit(exitCodeOfLeaving);
+}
+
+void giveUpJoining(int) {
+  constexpr std::string_view kText =
+      "Error: The processes of the job cannot reach each other by MPI: one of them was lost as they began\n";
+  static_cast<void>(::write(STDERR_FILENO, kText.data(), kText.size()) < 0);
+  exitCodeOfLeaving = 1;
+  leaveFromSignal(SIGALRM);
 }
 
 bool isDone(MPI_Request& request) {
@@ -75,6 +117,7 @@ bool isDone(MPI_Request& request) {
 /// Messages on their way. Lists, since MPI refers to contents and requests by address.
 struct Traffic {
   struct Send {
+    int rank = 0;  ///< the receiver's
     std::string content;
     MPI_Request request = MPI_REQUEST_NULL;
   };
@@ -96,13 +139,18 @@ struct Traffic {
   }
   /// Begins to receive what others have begun to send.
   void accept();
+  bool isRunningTo(const std::set<int>& others) const {
+    return std::any_of(running.begin(), running.end(), [&](const Send& send) { return !others.contains(send.rank); });
+  }
   /// The first message that is whole and has no earlier one of the same sender before it.
   std::optional<Message> take();
 };
 
 class MpiJob final : public Job {
  public:
-  MpiJob(int rank, int processCount) : rank_(rank), processCount_(processCount) {}
+  MpiJob(int rank, int processCount) : rank_(rank), processCount_(processCount) {
+    if (isKept_ && rank_ > 0) send(0, kIntroduction, NearProcesses::introduction());
+  }
 
   std::string_view means() const override { return "MPI"; }
   int rank() const override { return rank_; }
@@ -110,15 +158,25 @@ class MpiJob final : public Job {
   void send(int rank, int tag, std::string content) override;
   std::optional<Message> receive(double seconds) override;
   bool finalise(const std::function<bool()>& isEnough) override;
+  bool outlivesLosses() const override { return isKept_; }
+  bool hasEnded(int rank) override { return near_.hasEnded(rank); }
+  void leaveWithout(const std::set<int>& lost) override;
   void abort(int exitCode) override;
   void end(int exitCode) override;
 
  private:
+  void takeIntroduction(const Message& message);
+  void finaliseOrLeave(int exitCode);
+
   int rank_;
   int processCount_;
   bool isKept_ = launcherKeepsJob();
+  bool isOnOneNode_ = isJobOnOneNode(processCount_);
   MPI_Request leaving_ = MPI_REQUEST_NULL;
   Traffic traffic_;
+  NearProcesses near_;                          ///< in a job that outlives losses
+  std::optional<std::set<int>> leavesWithout_;  ///< processes that are lost
+  bool isLauncherBound_ = false;                ///< the launcher would wait for ever for a process that is lost
 };
 
 // Requests are tested until they are done, which the checker does not see.
@@ -141,6 +199,7 @@ void Traffic::accept() {
 void MpiJob::send(int rank, int tag, std::string content) {
   traffic_.complete();
   Traffic::Send& send = traffic_.running.emplace_back();
+  send.rank = rank;
   send.content = std::move(content);
   check(MPI_Isend(send.content.data(), static_cast<int>(send.content.size()), MPI_BYTE, rank, tag, MPI_COMM_WORLD,
                   &send.request),
@@ -170,12 +229,20 @@ std::optional<Message> MpiJob::receive(double seconds) {
     traffic_.accept();
     if (auto message = traffic_.take()) {
       traffic_.lastMessage = runTimeClock();
-      return message;
+      if (message->tag != kIntroduction) return message;
+      takeIntroduction(*message);
+      continue;
     }
     const double waited = secondsSince(start);
     if (waited >= seconds) return std::nullopt;
     nap(std::min(napLength(secondsSince(traffic_.lastMessage)), seconds - waited));
   }
+}
+
+/// Workers introduce themselves to the master, which does so in return.
+void MpiJob::takeIntroduction(const Message& message) {
+  near_.meet(message.rank, message.content);
+  if (rank_ == 0) send(message.rank, kIntroduction, NearProcesses::introduction());
 }
 
 // MPI_Finalize waits for every process, and can wait for ever: they meet before it.
@@ -197,6 +264,40 @@ bool MpiJob::finalise(const std::function<bool()>& isEnough) {
 }
 // NOLINTEND(clang-analyzer-optin.mpi.MPI-Checker)
 
+// A process that is stopped would keep the launcher from ending. With several nodes it does not even end when the last
+// of its processes has, if one of them was lost.
+void MpiJob::leaveWithout(const std::set<int>& lost) {
+  leavesWithout_ = lost;
+  isLauncherBound_ = !isOnOneNode_ && !lost.empty();
+  for (const int rank : lost) {
+    if (!near_.kill(rank)) isLauncherBound_ = true;
+  }
+  // The launcher should know of their end before MPI is finalised.
+  const auto hasEnded = [this](int rank) { return near_.hasEnded(rank); };
+  const double start = runTimeClock();
+  while (!isLauncherBound_ && !std::all_of(lost.begin(), lost.end(), hasEnded) && secondsSince(start) < kEndSeconds) {
+    nap(kLongestNap);
+  }
+  if (!lost.empty()) nap(kNoticeSeconds);
+}
+
+void MpiJob::finaliseOrLeave(int exitCode) {
+  const double start = runTimeClock();
+  for (traffic_.complete(); traffic_.isRunningTo(*leavesWithout_) && secondsSince(start) < kLastMessagesSeconds;) {
+    nap(kShortestNap);
+    traffic_.complete();
+  }
+  exitCodeOfLeaving = exitCode;
+  const bool areAllNear = isOnOneNode_ && near_.count() + 1 == static_cast<std::size_t>(processCount_);
+  if (rank_ == 0 && (exitCode != 0 || isLauncherBound_ || !areAllNear)) launcherOfLeaving = mpirunProcess();
+  if (isLauncherBound_ || exitCode != 0) leaveFromSignal(SIGALRM);
+  if (rank_ == 0) keepersOfLeaving = &near_;
+  ::signal(SIGALRM, leaveFromSignal);
+  ::alarm(leavesWithout_->empty() ? kFinaliseSeconds : kFinaliseWithoutSomeSeconds);
+  MPI_Finalize();
+  ::alarm(0);
+}
+
 void MpiJob::abort(int exitCode) {
   if (isKept_) endLauncher();  // MPI_Abort would end this process alone
   ::signal(SIGALRM, SIG_DFL);
@@ -206,6 +307,7 @@ void MpiJob::abort(int exitCode) {
 }
 
 void MpiJob::end(int exitCode) {
+  if (leavesWithout_) return finaliseOrLeave(exitCode);
   if (hasWorkers()) abort(exitCode);
   if (isKept_ && exitCode != 0) endLauncher();  // which makes its exit code 1
 }
@@ -221,7 +323,14 @@ const char mirevoModuleVersion[] = MIREVO_MODULE_VERSION;
 Job* mirevoJoinMpiJob() {
   // MPI_Finalize spins; several processes may share a core.
   ::setenv("OMPI_MCA_mpi_yield_when_idle", "1", 0);
+  if (launcherKeepsJob()) {
+    launcherOfLeaving = mpirunProcess();
+    ::signal(SIGALRM, giveUpJoining);
+    ::alarm(kInitialiseSeconds);
+  }
   int code = MPI_Init(nullptr, nullptr);
+  ::alarm(0);
+  launcherOfLeaving = 0;
   int count = 1;
   int rank = 0;
   if (code == MPI_SUCCESS) {
