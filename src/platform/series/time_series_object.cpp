@@ -9,9 +9,11 @@
 
 #include <fmt/format.h>
 
+#include "common/files.h"
 #include "common/text.h"
 #include "platform/series/csv_time_series.h"
 #include "platform/series/guarded_netcdf.h"
+#include "platform/series/rdb_time_series.h"
 #include "platform/series/series_reading.h"
 
 namespace mirevo {
@@ -27,10 +29,15 @@ struct SeriesFormat {
   std::string_view endings;  ///< of file names, in lower case, separated by blanks
   std::unique_ptr<TimeSeriesObject> (*make)(std::shared_ptr<SeriesReading>);
   bool isText;
+  /// Where formats share an ending: whether a file that begins like this is of this one. Of those that fit, or have no
+  /// such function, the last one is taken.
+  bool (*fits)(std::string_view head) = nullptr;
 };
 constexpr SeriesFormat kFormats[] = {
     {".csv .txt .tsv", make<CsvTimeSeries>, true},
     {".nc", make<GuardedNetcdf>, false},
+    {".rdb", make<RdbTimeSeries>, true},
+    {".txt", make<RdbTimeSeries>, true, RdbTimeSeries::fits},
 };
 
 std::string endingOf(const std::string& fileName) {
@@ -109,10 +116,19 @@ std::unique_ptr<TimeSeriesObject> createTimeSeriesObject(const std::string& file
   if (!reading) reading = std::make_shared<SeriesReading>();
   const std::string ending = endingOf(fileName);
   std::vector<std::string_view> known;
+  const SeriesFormat* found = nullptr;
+  std::optional<std::string> head;
   for (const SeriesFormat& format : kFormats) {
-    if (hasEnding(format, ending)) return format.make(std::move(reading));
-    for (const std::string_view each : splitAt(format.endings, ' ')) known.push_back(each);
+    for (const std::string_view each : splitAt(format.endings, ' ')) {
+      if (std::find(known.begin(), known.end(), each) == known.end()) known.push_back(each);
+    }
+    if (!hasEnding(format, ending)) continue;
+    // A file that cannot be read now is opened by the first format, which says why.
+    if (found != nullptr && !head) head = readFileHead(std::string(trimTrailing(fileName)), reason).value_or("");
+    if (found == nullptr || format.fits(*head)) found = &format;
   }
+  reason.clear();
+  if (found != nullptr) return found->make(std::move(reading));
   reason = fmt::format("expected a time-series file name ending in {} or {}, found {}",
                        fmt::join(known.begin(), known.end() - 1, ", "), known.back(),
                        ending.empty() ? "no ending" : "\"" + ending + "\"");

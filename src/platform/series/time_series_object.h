@@ -60,8 +60,9 @@ class TimeSeriesObject {
 
 struct SeriesReading;
 
-/// An object of the class for the ending of the file name; nullptr for an unknown ending. `reason` then names the known
-/// ones. Series of the same run share a `reading`; null: one of its own.
+/// An object of the class for the ending of the file name, and for the first bytes of the file where formats share the
+/// ending; nullptr for an unknown ending. `reason` then names the known ones. Series of the same run share a `reading`;
+/// null: one of its own.
 std::unique_ptr<TimeSeriesObject> createTimeSeriesObject(const std::string& fileName, std::string& reason,
                                                          std::shared_ptr<SeriesReading> reading = nullptr);
 /// Whether a series file of this name is text, all of which is read into memory.
