@@ -15,6 +15,7 @@
 #include "platform/series/guarded_netcdf.h"
 #include "platform/series/rdb_time_series.h"
 #include "platform/series/series_reading.h"
+#include "platform/series/xml_time_series.h"
 
 namespace mirevo {
 namespace {
@@ -38,6 +39,7 @@ constexpr SeriesFormat kFormats[] = {
     {".nc", make<GuardedNetcdf>, false},
     {".rdb", make<RdbTimeSeries>, true},
     {".txt", make<RdbTimeSeries>, true, RdbTimeSeries::fits},
+    {".xml", make<XmlTimeSeries>, true},
 };
 
 std::string endingOf(const std::string& fileName) {
