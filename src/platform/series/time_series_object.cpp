@@ -15,6 +15,7 @@
 #include "platform/series/guarded_netcdf.h"
 #include "platform/series/rdb_time_series.h"
 #include "platform/series/series_reading.h"
+#include "platform/series/swmm_results.h"
 #include "platform/series/xml_time_series.h"
 
 namespace mirevo {
@@ -35,11 +36,9 @@ struct SeriesFormat {
   bool (*fits)(std::string_view head) = nullptr;
 };
 constexpr SeriesFormat kFormats[] = {
-    {".csv .txt .tsv", make<CsvTimeSeries>, true},
-    {".nc", make<GuardedNetcdf>, false},
-    {".rdb", make<RdbTimeSeries>, true},
-    {".txt", make<RdbTimeSeries>, true, RdbTimeSeries::fits},
-    {".xml", make<XmlTimeSeries>, true},
+    {".csv .txt .tsv", make<CsvTimeSeries>, true}, {".nc", make<GuardedNetcdf>, false},
+    {".rdb", make<RdbTimeSeries>, true},           {".txt", make<RdbTimeSeries>, true, RdbTimeSeries::fits},
+    {".xml", make<XmlTimeSeries>, true},           {".out", make<SwmmResults>, false},
 };
 
 std::string endingOf(const std::string& fileName) {
