@@ -25,6 +25,7 @@ constexpr std::size_t kAtATime = std::size_t{1} << 20;
 
 bool BinaryFile::open(const std::string& path) {
   close();
+  path_ = path;
   fault_ = faultOfFile(path);
   if (!fault_.empty()) return false;
   file_ = std::make_unique<Descriptor>(::open(path.c_str(), O_RDONLY | O_CLOEXEC));

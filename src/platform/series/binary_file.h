@@ -23,6 +23,7 @@ class BinaryFile final {
   /// False, with fault(), when it cannot be opened.
   bool open(const std::string& path);
   void close();
+  const std::string& path() const { return path_; }
   std::uint64_t size() const { return size_; }
   const std::string& fault() const { return fault_; }
 
@@ -33,6 +34,12 @@ class BinaryFile final {
     static_assert(std::is_trivially_copyable_v<Number>);
     Number value;
     return read(place, &value, sizeof value) ? std::optional(value) : std::nullopt;
+  }
+  /// A real number of 8 or 4 bytes.
+  std::optional<double> real(std::uint64_t place, std::uint64_t width) {
+    if (width == sizeof(double)) return number<double>(place);
+    const auto value = number<float>(place);
+    return value ? std::optional<double>(*value) : std::nullopt;
   }
   std::optional<std::string> text(std::uint64_t place, std::size_t length);
   template <typename Number>
@@ -60,6 +67,7 @@ class BinaryFile final {
   void refuseEnd();
 
   std::shared_ptr<SeriesReading> reading_;
+  std::string path_;
   std::unique_ptr<Descriptor> file_;
   std::uint64_t size_ = 0;
   std::string fault_;

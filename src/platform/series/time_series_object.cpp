@@ -13,6 +13,8 @@
 #include "common/text.h"
 #include "platform/series/csv_time_series.h"
 #include "platform/series/guarded_netcdf.h"
+#include "platform/series/modflow_budget.h"
+#include "platform/series/modflow_heads.h"
 #include "platform/series/rdb_time_series.h"
 #include "platform/series/series_reading.h"
 #include "platform/series/swmm_results.h"
@@ -39,6 +41,7 @@ constexpr SeriesFormat kFormats[] = {
     {".csv .txt .tsv", make<CsvTimeSeries>, true}, {".nc", make<GuardedNetcdf>, false},
     {".rdb", make<RdbTimeSeries>, true},           {".txt", make<RdbTimeSeries>, true, RdbTimeSeries::fits},
     {".xml", make<XmlTimeSeries>, true},           {".out", make<SwmmResults>, false},
+    {".hds .ddn .ucn", make<ModflowHeads>, false}, {".cbc .bud", make<ModflowBudget>, false},
 };
 
 std::string endingOf(const std::string& fileName) {
