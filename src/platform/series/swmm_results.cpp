@@ -99,7 +99,7 @@ bool SwmmResults::readHeader() {
   pollutantUnits_.clear();
   const auto magic = file_.number<std::int32_t>(0);
   if (!magic || *magic != kMagic) {
-    return fail("expected the results of SWMM 5, found a file that does not begin with their mark");
+    return fail("expected results of SWMM 5 or EPANET 2, found a file that begins with the mark of neither");
   }
   if (!readEnd()) return false;
   const auto head = file_.numbers<std::int32_t>(0, kHeadNumbers);

@@ -12,6 +12,8 @@
 #include "common/files.h"
 #include "common/text.h"
 #include "platform/series/csv_time_series.h"
+#include "platform/series/epanet_results.h"
+#include "platform/series/grdc_time_series.h"
 #include "platform/series/guarded_netcdf.h"
 #include "platform/series/modflow_budget.h"
 #include "platform/series/modflow_heads.h"
@@ -38,10 +40,17 @@ struct SeriesFormat {
   bool (*fits)(std::string_view head) = nullptr;
 };
 constexpr SeriesFormat kFormats[] = {
-    {".csv .txt .tsv", make<CsvTimeSeries>, true}, {".nc", make<GuardedNetcdf>, false},
-    {".rdb", make<RdbTimeSeries>, true},           {".txt", make<RdbTimeSeries>, true, RdbTimeSeries::fits},
-    {".xml", make<XmlTimeSeries>, true},           {".out", make<SwmmResults>, false},
-    {".hds .ddn .ucn", make<ModflowHeads>, false}, {".cbc .bud", make<ModflowBudget>, false},
+    {".csv .txt .tsv", make<CsvTimeSeries>, true},
+    {".nc", make<GuardedNetcdf>, false},
+    {".rdb", make<RdbTimeSeries>, true},
+    {".txt", make<RdbTimeSeries>, true, RdbTimeSeries::fits},
+    {".xml", make<XmlTimeSeries>, true},
+    {".day .mon", make<GrdcTimeSeries>, true},
+    {".txt", make<GrdcTimeSeries>, true, GrdcTimeSeries::fits},
+    {".out", make<SwmmResults>, false},
+    {".out", make<EpanetResults>, false, EpanetResults::fits},
+    {".hds .ddn .ucn", make<ModflowHeads>, false},
+    {".cbc .bud", make<ModflowBudget>, false},
 };
 
 std::string endingOf(const std::string& fileName) {

@@ -71,8 +71,8 @@ TEST(SwmmResults, RefusesWhatIsNotWholeOrNotItsOwn) {
   const std::string closing = ": the file is cut off, or the model has not ended its run";
   const std::size_t size = whole.size();
   const std::tuple<std::string, std::string> cases[] = {
-      {"", "expected the results of SWMM 5, found a file that does not begin with their mark"},
-      {"time,Q\n", "expected the results of SWMM 5, found a file that does not begin with their mark"},
+      {"", "expected results of SWMM 5 or EPANET 2, found a file that begins with the mark of neither"},
+      {"time,Q\n", "expected results of SWMM 5 or EPANET 2, found a file that begins with the mark of neither"},
       {whole.substr(0, 10), "expected the closing record of SWMM 5 at its end, byte 0, found none" + closing},
       {whole.substr(0, size - 1), "expected the closing record of SWMM 5 at its end, byte " +
                                       std::to_string(size - 25) + ", found none" + closing},
