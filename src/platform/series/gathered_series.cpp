@@ -70,4 +70,10 @@ bool GatheredSeries::fail(std::size_t line, std::string_view expected, std::stri
   return false;
 }
 
+bool GatheredSeries::failToRead(std::string_view fault) {
+  forget();
+  lastError_ = fmt::format("{}: {}", sourceName_, fault);
+  return false;
+}
+
 }  // namespace mirevo

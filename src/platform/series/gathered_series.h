@@ -32,6 +32,8 @@ class GatheredSeries : public StoredTimeSeries {
   void gather(std::vector<Seconds> axes, std::vector<Column> columns);
   /// Stores "source:line: expected ..., found ..." as the last error; returns false.
   bool fail(std::size_t line, std::string_view expected, std::string_view found);
+  /// The same for a file that cannot be read.
+  bool failToRead(std::string_view fault);
   const std::string& sourceName() const final { return sourceName_; }
 
   std::string sourceName_;

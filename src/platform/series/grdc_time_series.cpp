@@ -6,7 +6,6 @@
 #include <fmt/core.h>
 
 #include "common/encoding.h"
-#include "common/files.h"
 #include "common/take_text.h"
 #include "common/text.h"
 #include "platform/series/file_zone.h"
@@ -34,42 +33,46 @@ bool GrdcTimeSeries::fits(std::string_view head) {
 }
 
 bool GrdcTimeSeries::open(const std::string& fileName) {
-  std::string reason;
-  const auto content = reading_ ? readTextFile(fileName, reason, reading_->watch) : readTextFile(fileName, reason);
-  if (content) return parse(fileName, *content);
-  forget();
-  lastError_ = fileName + ": " + reason;
-  return false;
+  FileParts parts(fileName, reading_);
+  return read(fileName, parts);
 }
 
-bool GrdcTimeSeries::parse(std::string sourceName, const std::string& content) {
+bool GrdcTimeSeries::parse(std::string sourceName, std::string_view content) {
+  FileParts parts(content);
+  return read(std::move(sourceName), parts);
+}
+
+bool GrdcTimeSeries::read(std::string sourceName, FileParts& parts) {
   forget();
   sourceName_ = std::move(sourceName);
-  const std::string text = decodeText(content).text;
-  endsLine_ = mirevo::endsLine(text);
-  std::string_view unit;
+  std::string unit;
   std::optional<std::int32_t> promised;
   std::vector<Column> columns;
   Seconds seconds;
   std::size_t number = 0;
-  for (const std::string_view line : splitLines(text)) {
+  while (const auto next = parts.nextLine()) {
+    const std::string_view line = *next;
     ++number;
     if (trim(line).empty()) continue;
     if (!columns.empty()) {
       if (!readRow(line, number, seconds, columns)) return false;
     } else if (line.starts_with('#')) {
-      for (const char* name : {"Unit of measure", "Unit"}) unit = unit.empty() ? saidOf(line, name) : unit;
+      for (const char* name : {"Unit of measure", "Unit"}) {
+        if (unit.empty()) unit = decodeText(saidOf(line, name)).text;
+      }
       if (!promised) promised = parseInteger(saidOf(line, "Data lines"));
     } else if (!line.starts_with(kHeading)) {
       return fail(number, fmt::format("the row \"{} ...\" of a GRDC station file", kHeading), quotedForMessage(line));
     } else {
       for (const std::string_view name : splitAt(line.substr(kHeading.size()), ';')) {
         const bool isFlag = trim(name) == "Flag";
-        columns.push_back({.name = std::string(trim(name)), .unit = isFlag ? "" : std::string(unit)});
+        columns.push_back({.name = std::string(trim(name)), .unit = isFlag ? "" : unit});
         if (columns.back().name.empty()) return fail(number, "names of columns", quotedForMessage(line));
       }
     }
   }
+  if (!parts.fault().empty()) return failToRead(parts.fault());
+  endsLine_ = number == 0 || parts.endsLine();
   number = std::max<std::size_t>(number, 1);
   if (columns.empty()) return fail(number, fmt::format("the row \"{} ...\"", kHeading), "the end of the file");
   if (promised && seconds.size() != static_cast<std::size_t>(*promised)) {

@@ -7,6 +7,7 @@
 #include <utility>
 #include <vector>
 
+#include "platform/series/file_parts.h"
 #include "platform/series/gathered_series.h"
 
 namespace mirevo {
@@ -23,13 +24,14 @@ class GrdcTimeSeries final : public GatheredSeries {
   explicit GrdcTimeSeries(std::shared_ptr<SeriesReading> reading = nullptr) : reading_(std::move(reading)) {}
 
   bool open(const std::string& fileName) override;
-  bool parse(std::string sourceName, const std::string& content);
+  bool parse(std::string sourceName, std::string_view content);
   bool endsLine() const override { return endsLine_; }
 
   /// Whether a file that begins like this is one, by its first row after the comments.
   static bool fits(std::string_view head);
 
  private:
+  bool read(std::string sourceName, FileParts& parts);
   bool readRow(std::string_view line, std::size_t number, Seconds& seconds, std::vector<Column>& columns);
 
   std::shared_ptr<SeriesReading> reading_;

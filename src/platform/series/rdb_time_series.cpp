@@ -7,8 +7,6 @@
 #include <fmt/core.h>
 
 #include "common/calendar.h"
-#include "common/encoding.h"
-#include "common/files.h"
 #include "common/take_text.h"
 #include "common/text.h"
 #include "platform/series/quality_codes.h"
@@ -50,12 +48,13 @@ bool RdbTimeSeries::fits(std::string_view head) {
 }
 
 bool RdbTimeSeries::open(const std::string& fileName) {
-  std::string reason;
-  const auto content = reading_ ? readTextFile(fileName, reason, reading_->watch) : readTextFile(fileName, reason);
-  if (content) return parse(fileName, *content);
-  clear();
-  lastError_ = fileName + ": " + reason;
-  return false;
+  FileParts parts(fileName, reading_);
+  return read(fileName, parts);
+}
+
+bool RdbTimeSeries::parse(std::string sourceName, std::string_view content) {
+  FileParts parts(content);
+  return read(std::move(sourceName), parts);
 }
 
 void RdbTimeSeries::clear() {
@@ -69,18 +68,14 @@ void RdbTimeSeries::clear() {
   columns_.clear();
 }
 
-bool RdbTimeSeries::parse(std::string sourceName, std::string_view content) {
+bool RdbTimeSeries::read(std::string sourceName, FileParts& parts) {
   clear();
   sourceName_ = std::move(sourceName);
-  endsLine_ = mirevo::endsLine(content);
   enum class Expected { names, formats, rows } expected = Expected::names;
   std::size_t number = 0;
-  while (!content.empty()) {
-    const std::size_t end = std::min(content.find('\n'), content.size());
-    std::string_view line = content.substr(0, end);
-    content.remove_prefix(std::min(end + 1, content.size()));
+  while (const auto next = parts.nextLine()) {
+    const std::string_view line = *next;
     ++number;
-    if (line.ends_with('\r')) line.remove_suffix(1);
     if (line.starts_with('#')) {
       if (expected == Expected::formats) return fail(number, "the row of formats, as 5s, 15s, 20d", "a comment");
       comments_.emplace_back(line);
@@ -97,6 +92,8 @@ bool RdbTimeSeries::parse(std::string sourceName, std::string_view content) {
       return false;
     }
   }
+  if (!parts.fault().empty()) return failToRead(parts.fault());
+  endsLine_ = number == 0 || parts.endsLine();
   if (expected == Expected::formats || (expected == Expected::names && axes_.empty())) {
     return fail(std::max<std::size_t>(number, 1),
                 expected == Expected::names ? "a row of column names" : "the row of formats, as 5s, 15s, 20d",

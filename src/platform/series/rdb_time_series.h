@@ -7,6 +7,7 @@
 #include <utility>
 #include <vector>
 
+#include "platform/series/file_parts.h"
 #include "platform/series/file_zone.h"
 #include "platform/series/gathered_series.h"
 
@@ -46,6 +47,7 @@ class RdbTimeSeries final : public GatheredSeries {
     std::map<std::string, std::size_t> columns;  ///< by name, the place among columns_
   };
 
+  bool read(std::string sourceName, FileParts& parts);
   void clear();
   bool readNames(std::string_view line, std::size_t number);
   bool readFormats(std::string_view line, std::size_t number);

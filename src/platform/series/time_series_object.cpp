@@ -124,6 +124,14 @@ bool isTextSeries(const std::string& fileName) {
   });
 }
 
+std::string howToMarkMissing(const std::string& fileName, float value) {
+  const std::string ending = endingOf(fileName);
+  if (ending == ".nc") return "make it the attribute missing_value of the variable";
+  const bool isTable = hasEnding(kFormats[0], ending);
+  return isTable ? fmt::format("write \"# missing = {}\" above the header row", value)
+                 : "mark it as this format does, or leave it out with Lowest_Observed or Highest_Observed";
+}
+
 std::unique_ptr<TimeSeriesObject> createTimeSeriesObject(const std::string& fileName, std::string& reason,
                                                          std::shared_ptr<SeriesReading> reading) {
   if (!reading) reading = std::make_shared<SeriesReading>();

@@ -1,19 +1,14 @@
 #include "platform/series/xml_time_series.h"
 
 #include <algorithm>
-#include <cerrno>
 #include <cmath>
-#include <cstring>
-#include <fcntl.h>
 #include <limits>
 #include <optional>
 #include <pugixml.hpp>
 
 #include <fmt/core.h>
 
-#include "common/descriptor.h"
 #include "common/encoding.h"
-#include "common/files.h"
 #include "common/text.h"
 #include "platform/series/file_zone.h"
 #include "platform/series/quality_codes.h"
@@ -338,9 +333,7 @@ class XmlTimeSeries::Reader final {
   std::size_t faultLine_ = 0;
 };
 
-/// `nextBytes` returns the next part of the file, nothing at its end; it sets lastError_ where it cannot.
-template <typename NextBytes>
-bool XmlTimeSeries::read(std::string sourceName, const NextBytes& nextBytes) {
+bool XmlTimeSeries::read(std::string sourceName, FileParts& parts) {
   forget();
   sourceName_ = std::move(sourceName);
   Reader reader;
@@ -351,8 +344,8 @@ bool XmlTimeSeries::read(std::string sourceName, const NextBytes& nextBytes) {
   bool isSound = true;
   bool isFirst = true;
   while (isSound) {
-    const std::string_view bytes = nextBytes();
-    if (!lastError_.empty()) return false;
+    const std::string_view bytes = parts.next();
+    if (!parts.fault().empty()) return failToRead(parts.fault());
     if (bytes.empty()) break;
     if (std::exchange(isFirst, false) && isUtf16(bytes)) {
       lastError_ = fmt::format("{}: {}", sourceName_, faultOfEncoding(bytes));
@@ -374,31 +367,13 @@ bool XmlTimeSeries::read(std::string sourceName, const NextBytes& nextBytes) {
 }
 
 bool XmlTimeSeries::parse(std::string sourceName, std::string_view content) {
-  return read(std::move(sourceName), [&] { return std::exchange(content, {}); });
+  FileParts parts(content);
+  return read(std::move(sourceName), parts);
 }
 
 bool XmlTimeSeries::open(const std::string& fileName) {
-  forget();
-  lastError_ = faultOfFile(fileName);
-  const Descriptor file(lastError_.empty() ? ::open(fileName.c_str(), O_RDONLY | O_CLOEXEC) : -1);
-  if (file.get() < 0) {
-    if (lastError_.empty()) lastError_ = std::strerror(errno);
-    lastError_ = fmt::format("{}: {}", fileName, lastError_);
-    return false;
-  }
-  std::string part(std::size_t{1} << 20, '\0');
-  return read(fileName, [&]() -> std::string_view {
-    if (reading_ && reading_->watch.isOver()) {
-      lastError_ = fmt::format("{}: {}", fileName, reading_->watch.reason());
-      return {};
-    }
-    ssize_t count = 0;
-    do {
-      count = ::read(file.get(), part.data(), part.size());
-    } while (count < 0 && errno == EINTR);
-    if (count < 0) lastError_ = fmt::format("{}: {}", fileName, std::strerror(errno));
-    return std::string_view(part).substr(0, count < 0 ? 0 : static_cast<std::size_t>(count));
-  });
+  FileParts parts(fileName, reading_);
+  return read(fileName, parts);
 }
 
 }  // namespace mirevo

@@ -5,6 +5,7 @@
 #include <string_view>
 #include <utility>
 
+#include "platform/series/file_parts.h"
 #include "platform/series/gathered_series.h"
 
 namespace mirevo {
@@ -25,8 +26,7 @@ class XmlTimeSeries final : public GatheredSeries {
 
  private:
   class Reader;
-  template <typename NextBytes>
-  bool read(std::string sourceName, const NextBytes& nextBytes);
+  bool read(std::string sourceName, FileParts& parts);
 
   std::shared_ptr<SeriesReading> reading_;
 };

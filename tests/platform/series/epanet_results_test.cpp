@@ -15,12 +15,12 @@
 namespace mirevo {
 namespace {
 
-constexpr std::int32_t kMagic = 516114521;
+constexpr std::int32_t kEpanetMark = 516114521;
 
 /// Junction J and tank T, the pipe P between them, one pump's energy, litres per second; every half hour from 1:00 on.
 std::string epanetFile(std::int32_t steps) {
   Bytes file;
-  file.ints({kMagic, 20012, 2, 1, 1, 1, 0, 1, 0, 5, 2, 0, 3600, 1800, 7200});
+  file.ints({kEpanetMark, 20012, 2, 1, 1, 1, 0, 1, 0, 5, 2, 0, 3600, 1800, 7200});
   file.field("title", 3 * 80).field("n.inp", 2 * 260).field("Chlorine", 32).field("ug/L", 32);
   for (const char* name : {"J", "T", "P"}) file.field(name, 32);
   file.ints({1, 2, 1, 2}).floats({0, 10, 20, 500, 300});  // ends, type of the pipe and tank; area, elevations, pipe
@@ -28,7 +28,7 @@ std::string epanetFile(std::int32_t steps) {
   for (std::int32_t step = 0; step < steps; ++step) {
     for (int column = 0; column < 16; ++column) file.floats({static_cast<float>(100 * step + column)});
   }
-  file.floats({0, 0, 0, 0}).ints({steps, 0, kMagic});
+  file.floats({0, 0, 0, 0}).ints({steps, 0, kEpanetMark});
   return file.content;
 }
 

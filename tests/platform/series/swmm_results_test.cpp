@@ -17,12 +17,12 @@
 namespace mirevo {
 namespace {
 
-constexpr std::int32_t kMagic = 516114522;
+constexpr std::int32_t kSwmmMark = 516114522;
 
 /// One subcatchment with its rainfall, nodes J1 and J2 with depth and lead, no link, the system's temperature; metric.
 std::string swmmFile(std::int32_t steps, std::int32_t errorCode = 0) {
   Bytes file;
-  file.ints({kMagic, 51015, 3, 1, 2, 0, 1});
+  file.ints({kSwmmMark, 51015, 3, 1, 2, 0, 1});
   for (const std::string name : {"S", "J1", "J2", "lead"})
     file.ints({static_cast<std::int32_t>(name.size())}).text(name);
   file.ints({1});                                            // unit of lead
@@ -38,7 +38,7 @@ std::string swmmFile(std::int32_t steps, std::int32_t errorCode = 0) {
     file.doubles({36526 + (step + 1) / 24.0 + (step % 2 == 0 ? 1 : -1) * 1e-3 / 86400});
     file.floats({k, 10 + k, 20 + k, 30 + k, 40 + k, 50 + k});
   }
-  file.ints({28, 60, results, steps, errorCode, kMagic});
+  file.ints({28, 60, results, steps, errorCode, kSwmmMark});
   return file.content;
 }
 
