@@ -105,7 +105,10 @@ bool RdbTimeSeries::read(std::string sourceName, FileParts& parts) {
 
 bool RdbTimeSeries::readNames(std::string_view line, std::size_t number) {
   table_ = {};
-  for (const std::string_view name : splitAt(line, '\t')) table_.names.emplace_back(trim(name));
+  for (const std::string_view name : splitAt(line, '\t')) {
+    table_.names.emplace_back(trim(name));
+    if (trim(name).empty()) return fail(number, "a name for each column", quotedForMessage(line));
+  }
   return table_.names.size() > 1 || fail(number, "column names separated by tabs", quotedForMessage(line));
 }
 

@@ -74,6 +74,7 @@ TEST(RdbTimeSeries, RefusesWithThePlaceAndWhatWasExpected) {
       {"", "1: expected a row of column names, found the end of the file"},
       {"# c\nno tabs\n", "2: expected column names separated by tabs, found \"no tabs\""},
       {"# c\na\tb\n", "2: expected the row of formats, as 5s, 15s, 20d, found the end of the file"},
+      {"a\t\n5d\t5n\n", "1: expected a name for each column, found \"a\t\""},
       {"a\tb\n1\t2\n", "2: expected the row of formats, as 5s, 15s, 20d, found \"1\t2\""},
       {"a\tb\n5s\t5s\t5s\n", "2: expected 2 columns as in the row of names, found 3"},
       {"a\tb\n5s\t5n\n", "2: expected a column of format d, the time, found \"5s\t5n\""},
