@@ -56,7 +56,7 @@ while IFS=: read -r file line _; do
     "$root"/src/platform/*.cpp) ;;
     *) fault "$file:$line: third-party headers of the platform belong in platform/*.cpp" ;;
   esac
-done < <(grep -rnE '^#include <(muParser|netcdf|mpi)' "$root/src")
+done < <(grep -rnE '^#include <(muParser|netcdf|pugixml|mpi)' "$root/src")
 
 documented=$(grep -oE '^\| `src/[a-z/]+/`' "$root/docs/architecture.md" | sed -E 's/.*`src\/(.*)\/`/\1/')
 [ "$documented" = "$(printf '%s\n' "${rooms[@]}")" ] ||

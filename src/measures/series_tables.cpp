@@ -314,9 +314,7 @@ void SeriesTables::warnOfMarkers(const ObservedSeries& observed, const OutputMea
       "{}: item No. {} ({}) is {} at {} of {} times in the evaluation period, and is compared there; if that marks "
       "missing values, {}",
       name, item, observation(observed.measure).itemName(item), static_cast<float>(marker), count,
-      observed.values.size(),
-      isTextSeries(name) ? fmt::format("write \"# missing = {}\" above the header row", static_cast<float>(marker))
-                         : "make it the attribute missing_value of the variable");
+      observed.values.size(), howToMarkMissing(name, static_cast<float>(marker)));
   addWarning(measure.observation.fileLocation, warning);
 }
 

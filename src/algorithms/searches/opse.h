@@ -1,5 +1,6 @@
 #pragma once
 
+#include <algorithm>
 #include <cstddef>
 #include <cstdint>
 #include <deque>
@@ -70,6 +71,7 @@ class OpseMethod final : public PopulationMethod {
   std::vector<SearchAdvice> advice(std::size_t n) const override;
   std::int64_t populationSize() const override { return settings.populationSize; }
   double evaluationsPerLoop() const override { return settings.populationSize; }
+  std::int64_t mostAtOnce() const override { return std::max(settings.populationSize, settings.setsInFlight); }
   std::unique_ptr<SearchAlgorithm> make(SearchProblem problem) const override;
 
   OpseSettings settings;

@@ -1,5 +1,10 @@
 #include "algorithms/searches/search_methods.h"
 
+#include <string>
+#include <vector>
+
+#include <fmt/format.h>
+
 #include "algorithms/searches/dds.h"
 #include "algorithms/searches/opse.h"
 #include "algorithms/searches/pdds.h"
@@ -14,13 +19,15 @@ const ChoiceTable<SearchMethod>& searchMethods() {
   return searches;
 }
 
-std::string searchesWith(bool SearchFacts::*fact, std::string_view between) {
-  std::string names;
+std::string searchesWith(bool SearchFacts::*fact, std::string_view last, std::string_view quote) {
+  std::vector<std::string> names;
   for (const auto& search : searchMethods().all()) {
-    if (!(search->facts().*fact)) continue;
-    names.append(names.empty() ? "" : between).append(search->facts().name.name);
+    if (search->facts().*fact) names.push_back(fmt::format("{0}{1}{0}", quote, search->facts().name.name));
   }
-  return names;
+  if (names.size() < 2) return names.empty() ? std::string() : names.front();
+  const std::string end = fmt::format(" {} {}", last, names.back());
+  names.pop_back();
+  return fmt::format("{}{}", fmt::join(names, ", "), end);
 }
 
 }  // namespace mirevo

@@ -11,7 +11,7 @@ namespace mirevo {
 /// All searches.
 const ChoiceTable<SearchMethod>& searchMethods();
 
-/// The names of the searches for which `fact` is true, separated by `between`: "SCE or PSE" for " or ".
-std::string searchesWith(bool SearchFacts::*fact, std::string_view between);
+/// The names of the searches for which `fact` is true, each between two `quote`s: "SCE, PSE or OPSE" if `last` is "or".
+std::string searchesWith(bool SearchFacts::*fact, std::string_view last, std::string_view quote = {});
 
 }  // namespace mirevo

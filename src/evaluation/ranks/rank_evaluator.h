@@ -37,7 +37,7 @@ class RankEvaluator final : public Evaluator {
  private:
   struct Worker {
     std::optional<ReadyMessage> place;  ///< host and process folder; empty until it is ready
-    std::optional<std::size_t> set;  ///< place in the ledger of the set that it runs, unless another's result counts
+    std::optional<std::size_t> set;     ///< place in the ledger of the set that it runs, unless another's result counts
     std::optional<ResultMessage> answer;  ///< waits for the first successful run, see EvaluationLedger::judge()
     bool isGivenUp = false;               ///< its process folder cannot be used any more
     bool isLate = false;                  ///< its set was put back

@@ -9,10 +9,18 @@
 
 #include <fmt/format.h>
 
+#include "common/files.h"
 #include "common/text.h"
 #include "platform/series/csv_time_series.h"
+#include "platform/series/epanet_results.h"
+#include "platform/series/grdc_time_series.h"
 #include "platform/series/guarded_netcdf.h"
+#include "platform/series/modflow_budget.h"
+#include "platform/series/modflow_heads.h"
+#include "platform/series/rdb_time_series.h"
 #include "platform/series/series_reading.h"
+#include "platform/series/swmm_results.h"
+#include "platform/series/xml_time_series.h"
 
 namespace mirevo {
 namespace {
@@ -27,10 +35,22 @@ struct SeriesFormat {
   std::string_view endings;  ///< of file names, in lower case, separated by blanks
   std::unique_ptr<TimeSeriesObject> (*make)(std::shared_ptr<SeriesReading>);
   bool isText;
+  /// Where formats share an ending: whether a file that begins like this is of this one. Of those that fit, or have no
+  /// such function, the last one is taken.
+  bool (*fits)(std::string_view head) = nullptr;
 };
 constexpr SeriesFormat kFormats[] = {
     {".csv .txt .tsv", make<CsvTimeSeries>, true},
     {".nc", make<GuardedNetcdf>, false},
+    {".rdb", make<RdbTimeSeries>, true},
+    {".txt", make<RdbTimeSeries>, true, RdbTimeSeries::fits},
+    {".xml", make<XmlTimeSeries>, true},
+    {".day .mon", make<GrdcTimeSeries>, true},
+    {".txt", make<GrdcTimeSeries>, true, GrdcTimeSeries::fits},
+    {".out", make<SwmmResults>, false},
+    {".out", make<EpanetResults>, false, EpanetResults::fits},
+    {".hds .ddn .ucn", make<ModflowHeads>, false},
+    {".cbc .bud", make<ModflowBudget>, false},
 };
 
 std::string endingOf(const std::string& fileName) {
@@ -104,15 +124,32 @@ bool isTextSeries(const std::string& fileName) {
   });
 }
 
+std::string howToMarkMissing(const std::string& fileName, float value) {
+  const std::string ending = endingOf(fileName);
+  if (ending == ".nc") return "make it the attribute missing_value of the variable";
+  const bool isTable = hasEnding(kFormats[0], ending);
+  return isTable ? fmt::format("write \"# missing = {}\" above the header row", value)
+                 : "mark it as this format does, or leave it out with Lowest_Observed or Highest_Observed";
+}
+
 std::unique_ptr<TimeSeriesObject> createTimeSeriesObject(const std::string& fileName, std::string& reason,
                                                          std::shared_ptr<SeriesReading> reading) {
   if (!reading) reading = std::make_shared<SeriesReading>();
   const std::string ending = endingOf(fileName);
   std::vector<std::string_view> known;
+  const SeriesFormat* found = nullptr;
+  std::optional<std::string> head;
   for (const SeriesFormat& format : kFormats) {
-    if (hasEnding(format, ending)) return format.make(std::move(reading));
-    for (const std::string_view each : splitAt(format.endings, ' ')) known.push_back(each);
+    for (const std::string_view each : splitAt(format.endings, ' ')) {
+      if (std::find(known.begin(), known.end(), each) == known.end()) known.push_back(each);
+    }
+    if (!hasEnding(format, ending)) continue;
+    // A file that cannot be read now is opened by the first format, which says why.
+    if (found != nullptr && !head) head = readFileHead(std::string(trimTrailing(fileName)), reason).value_or("");
+    if (found == nullptr || format.fits(*head)) found = &format;
   }
+  reason.clear();
+  if (found != nullptr) return found->make(std::move(reading));
   reason = fmt::format("expected a time-series file name ending in {} or {}, found {}",
                        fmt::join(known.begin(), known.end() - 1, ", "), known.back(),
                        ending.empty() ? "no ending" : "\"" + ending + "\"");

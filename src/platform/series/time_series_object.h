@@ -60,12 +60,15 @@ class TimeSeriesObject {
 
 struct SeriesReading;
 
-/// An object of the class for the ending of the file name; nullptr for an unknown ending. `reason` then names the known
-/// ones. Series of the same run share a `reading`; null: one of its own.
+/// An object of the class for the ending of the file name, and for the first bytes of the file where formats share the
+/// ending; nullptr for an unknown ending. `reason` then names the known ones. Series of the same run share a `reading`;
+/// null: one of its own.
 std::unique_ptr<TimeSeriesObject> createTimeSeriesObject(const std::string& fileName, std::string& reason,
                                                          std::shared_ptr<SeriesReading> reading = nullptr);
-/// Whether a series file of this name is text, all of which is read into memory.
+/// Whether a series file of this name is text, of which a damaged one may have no end.
 bool isTextSeries(const std::string& fileName);
+/// What a user does to mark a value as missing in a series file of this name: "write ...".
+std::string howToMarkMissing(const std::string& fileName, float value);
 
 /// A name with its unit in brackets at the end, "Discharge [m3/s]" or "Discharge (m3/s)", in two parts; the second is
 /// empty where there are none.

@@ -217,7 +217,7 @@ const SettingSection<ModelParameter>& parameterSection() {
                                          .unit = "of the parameter",
                                          .meaning = fmt::format("Highest value, not below the lowest; above it for a "
                                                                 "variable parameter that {} searches.",
-                                                                searchesWith(&SearchFacts::needsRanges, " or "))}),
+                                                                searchesWith(&SearchFacts::needsRanges, "or"))}),
         setting<&Parameter::transformationType>(
             {.name = "Transformation_Type",
              .defaultValue = "0",

@@ -94,7 +94,7 @@ const SettingSection<RunConfig>& slotsSection() {
                  .meaning = fmt::format(
                      "Model runs at once, each in a process folder of its own; no more than the run has evaluations. "
                      "In an optimisation more than 1 needs {}. In an MPI job: 1 on each worker.",
-                     searchesWith(&SearchFacts::runsInParallel, " or ")),
+                     searchesWith(&SearchFacts::runsInParallel, "or")),
                  .bearsOnResults = kNotOfResults}),
             [](const RunConfig& config) { return validateProcessCount(config); }),
         setting<&RunConfig::useSingleThread>({.name = "UseSingleThread",

@@ -48,7 +48,7 @@ const SettingSection<OptimisationTask>& optimisationSection() {
              .defaultValue = "0",
              .codes = kNoYesNames,
              .meaning = fmt::format("0 no, 1 yes; for {}. Any other number runs no search.",
-                                    searchesWith(&SearchFacts::usesSurrogate, " and "))})}}};
+                                    searchesWith(&SearchFacts::usesSurrogate, "and"))})}}};
   return section;
 }
 
@@ -63,7 +63,7 @@ void refuseEmptyRanges(const TaskReading& reading) {
     reading.parameterSections[i].refuse(
         "Error: Lower bound equal to upper bound for parameter " + parameter.name, "Upper_Bound",
         fmt::format("expected more than {} for a search by {}; Parameter_Type = 1 fixes a parameter",
-                    parameter.lowerBound, searchesWith(&SearchFacts::needsRanges, " or ")));
+                    parameter.lowerBound, searchesWith(&SearchFacts::needsRanges, "or")));
   }
 }
 
@@ -134,9 +134,9 @@ void logBestSet(const TaskContext& context, const ParameterSet& best, const Eval
   context.log.line(fmt::format("Aggregate: {}", formatReal(result.aggregate)));
 }
 
-/// "Algorithm_Type = 'PSE' or 'PDDS', or ..."
+/// "Algorithm_Type = 'PSE', 'PDDS' or 'OPSE', or ..."
 std::string waysToRunSeveral() {
-  std::string text = fmt::format("{} = '{}'", kAlgorithmKeyword, searchesWith(&SearchFacts::runsInParallel, "' or '"));
+  std::string text = fmt::format("{} = {}", kAlgorithmKeyword, searchesWith(&SearchFacts::runsInParallel, "or", "'"));
   for (const auto& search : searchMethods().all()) {
     const SearchFacts& facts = search->facts();
     if (facts.runsAtOnceUnderMpi.empty()) continue;

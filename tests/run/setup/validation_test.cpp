@@ -191,10 +191,11 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
        "Population size and/or initial No. of generations too small for surrogate modelling optimisation",
        "Neighbourhood_Size = 61 evaluated sets before the surrogate is fitted, found 60"},
       {"Algorithm_Type = 1 => 2", "Use Population Simplex Evolution algorithm for application with multiple processors",
-       "expected 1 with this Algorithm_Type, found 4; several model runs at a time: Algorithm_Type = 'PSE' or 'PDDS', "
-       "or a job of several processes (MPI), in which SCE runs one proposal of each complex at once"},
+       "expected 1 with this Algorithm_Type, found 4; several model runs at a time: Algorithm_Type = 'PSE', 'PDDS' "
+       "or 'OPSE', or a job of several processes (MPI), in which SCE runs one proposal of each complex at once"},
       {"Algorithm_Type = 1 => 0", "Use Population Simplex Evolution algorithm for application with multiple processors",
-       "found 4; several model runs at a time: Algorithm_Type = 'PSE' or 'PDDS', or a job of several processes (MPI)"},
+       "found 4; several model runs at a time: Algorithm_Type = 'PSE', 'PDDS' or 'OPSE', or a job of several processes "
+       "(MPI)"},
       {"Algorithm_Type = 1 => 'PDDS' & Max_No_Evaluations = 500 => 0",
        "Maximum No. of model evaluations in PDDS algorithm invalid", ""},
       // Scale and location that nothing can give

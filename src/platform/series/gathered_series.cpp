@@ -1,0 +1,79 @@
+#include "platform/series/gathered_series.h"
+
+#include <algorithm>
+
+#include <fmt/core.h>
+
+#include "common/calendar.h"
+
+namespace mirevo {
+
+void GatheredSeries::forget() {
+  lastError_.clear();
+  doubts_.clear();
+  startSecond_ = 0;
+  times_.clear();
+  items_.clear();
+  values_.clear();
+  axisOf_.clear();
+  steps_.clear();
+}
+
+void GatheredSeries::gather(std::vector<Seconds> axes, std::vector<Column> columns) {
+  Seconds all;
+  for (const Seconds& axis : axes) {
+    if (axis == all) continue;
+    Seconds merged;
+    merged.reserve(all.size() + axis.size());
+    std::set_union(all.begin(), all.end(), axis.begin(), axis.end(), std::back_inserter(merged));
+    all = std::move(merged);
+  }
+  if (!all.empty()) startSecond_ = all.front();
+  times_.reserve(all.size());
+  for (const std::int64_t second : all) {
+    times_.push_back(static_cast<double>(second - startSecond_) / static_cast<double>(kSecondsOfDay));
+  }
+  for (const Seconds& axis : axes) {
+    std::vector<std::uint32_t>& steps = steps_.emplace_back();
+    steps.reserve(axis.size());
+    std::size_t step = 0;
+    for (const std::int64_t second : axis) {
+      while (all[step] < second) ++step;
+      steps.push_back(static_cast<std::uint32_t>(step));
+    }
+  }
+  for (Column& column : columns) {
+    items_.push_back({std::move(column.name)});
+    items_.back().unit = std::move(column.unit);
+    axisOf_.push_back(column.axis);
+    values_.push_back(std::move(column.values));
+  }
+}
+
+bool GatheredSeries::readItem(std::size_t place) {
+  const std::vector<double> exact = readExactItem(place);
+  items_[place].values.assign(exact.begin(), exact.end());
+  return true;
+}
+
+std::vector<double> GatheredSeries::readExactItem(std::size_t place) {
+  std::vector<double> exact(times_.size(), std::numeric_limits<double>::quiet_NaN());
+  const std::vector<std::uint32_t>& steps = steps_[axisOf_[place]];
+  for (std::size_t i = 0; i < steps.size(); ++i) exact[steps[i]] = values_[place][i];
+  return exact;
+}
+
+bool GatheredSeries::fail(std::size_t line, std::string_view expected, std::string_view found) {
+  const std::string source = sourceName_;
+  forget();
+  lastError_ = fmt::format("{}:{}: expected {}, found {}", source, line, expected, found);
+  return false;
+}
+
+bool GatheredSeries::failToRead(std::string_view fault) {
+  forget();
+  lastError_ = fmt::format("{}: {}", sourceName_, fault);
+  return false;
+}
+
+}  // namespace mirevo
