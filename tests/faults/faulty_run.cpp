@@ -42,12 +42,20 @@ std::string excerpt(const std::string& text) {
 }
 
 /// The rows of a result file by their number, line ends included; `torn` is what stands behind the last line end.
+/// Without the column that the first repeated set adds to all rows: a run that was killed before has none.
 std::map<int, std::string> rowsOf(const std::string& text, std::string& torn) {
   std::map<int, std::string> rows;
+  bool hasRepeats = false;
   std::size_t begin = 0;
   for (auto end = text.find('\n'); end != std::string::npos; end = text.find('\n', begin)) {
-    const std::string line = text.substr(begin, end + 1 - begin);
-    if (line[0] != '#' && !line.starts_with("Evaluation")) rows[std::atoi(line.c_str())] = line;
+    std::string line = text.substr(begin, end + 1 - begin);
+    if (line.starts_with("Evaluation")) {
+      hasRepeats = line.ends_with("\tRepeats\n");
+    } else if (line[0] != '#') {
+      if (const auto last = line.rfind('\t'); hasRepeats && last != std::string::npos)
+        line = line.substr(0, last) + '\n';
+      rows[std::atoi(line.c_str())] = line;
+    }
     begin = end + 1;
   }
   torn = text.substr(begin);

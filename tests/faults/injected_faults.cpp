@@ -99,6 +99,8 @@ bool mayPassSilently(const Call& call) {
     return true;  // another took its place
   // What is left of a lock keeps nobody away, and what it says of its holder is for a message only.
   if (path.ends_with("._lock_")) return name != "lock" && name != "open-to-write";
+  // What it records of the copies only tells a later run which of them it need not make again.
+  if (path.ends_with(".mirevo_process") && (name == "read" || name == "write")) return true;
   // What cannot be compared is written anew, beside the one of before.
   const std::string kind = kindOf(path);
   if ((name == "read" || name == "open-to-read") &&

@@ -140,13 +140,16 @@ std::vector<Damage> damagesOf(const std::string& whole, const std::string& row, 
   const std::string failed = first + "FAILED" + row.substr(row.find('\t', first.size()));
   damages.push_back({"another status", with(failed), sums, isOk ? where + "it is not as it was written" : "", without});
   if (isOk) damages.push_back({"another status, no checksums", with(failed), {}, where + "its status is", without});
-  for (std::size_t begin = row.find('\t', first.size()) + 1; begin < row.size();) {
+  const bool hasRepeats = whole.find("\tRepeats\n") != std::string::npos;
+  const std::size_t last = hasRepeats ? row.rfind('\t') : row.size() - 1;  // the end of the aggregate
+  const std::size_t lastTab = row.rfind('\t', last - 1);
+  for (std::size_t begin = row.find('\t', first.size()) + 1; begin < last;) {
     const std::size_t end = row.find_first_of("\t\n", begin);
     const std::string other = with(std::string(row).replace(begin, end - begin, "0.123"));
     damages.push_back({"another value", other, sums, where + "it is not as it was written", without});
-    if (isOk && end == row.rfind('\t')) {
+    if (isOk && end == lastTab) {
       damages.push_back({"another value, no checksums", other, {}, where + "objective function \"", without});
-    } else if (isOk && row[end] == '\n') {
+    } else if (isOk && end == last) {
       damages.push_back(
           {"another aggregate, no checksums", other, {}, isScaled ? "" : where + "the aggregate is", without});
     }

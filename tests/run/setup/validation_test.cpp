@@ -171,7 +171,7 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
        "Perturbed value for parameter Depth in local sensitivity analysis out of bounds",
        "0.75 of the range, from 412.5, leaves the bounds 100 to 900 both ways (logarithms)"},
       {"Upper_Bound = 1.0 => 0.31 & Lower_Bound = 0.0 => 0.31", "Lower bound equal to upper bound for parameter Rate",
-       "expected more than 0.31 for a search by SCE or PSE or OPSE; Parameter_Type = 1 fixes a parameter"},
+       "expected more than 0.31 for a search by SCE, PSE or OPSE; Parameter_Type = 1 fixes a parameter"},
       {"Algorithm_Type = 1 => 0 & No_Points_Subcomplex = 6 => 8",
        "No. of points in a subcomplex in SCE algorithm invalid", "at most the 7 points of a complex, found 8"},
       {"No_Points_Simplex = 5 => 21", "No. of points in a simplex in PSE algorithm invalid", "at most the 20 points"},
