@@ -36,10 +36,10 @@ void GatheredSeries::gather(std::vector<Seconds> axes, std::vector<Column> colum
   for (const Seconds& axis : axes) {
     std::vector<std::uint32_t>& steps = steps_.emplace_back();
     steps.reserve(axis.size());
-    std::size_t step = 0;
+    auto step = all.begin();
     for (const std::int64_t second : axis) {
-      while (all[step] < second) ++step;
-      steps.push_back(static_cast<std::uint32_t>(step));
+      step = std::find(step, all.end(), second);
+      steps.push_back(static_cast<std::uint32_t>(step - all.begin()));
     }
   }
   for (Column& column : columns) {

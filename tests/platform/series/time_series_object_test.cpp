@@ -73,9 +73,13 @@ TEST(TimeSeriesObject, TheEndingOfTheNameChoosesTheReader) {
   std::string reason;
   for (const char* name : {"a.csv", "b/c.TXT", "d.tsv  "}) EXPECT_NE(createTimeSeriesObject(name, reason), nullptr);
   EXPECT_EQ(createTimeSeriesObject("x/sim.xls", reason), nullptr);
-  EXPECT_EQ(reason, "expected a time-series file name ending in .csv, .txt, .tsv, .nc, .rdb, .xml, .day, .mon, .out, .hds, .ddn, .ucn, .cbc or .bud, found \".xls\"");
+  EXPECT_EQ(reason,
+            "expected a time-series file name ending in .csv, .txt, .tsv, .nc, .rdb, .xml, .day, .mon, .out, .hds, "
+            ".ddn, .ucn, .cbc or .bud, found \".xls\"");
   EXPECT_EQ(createTimeSeriesObject("x.csv/sim", reason), nullptr);
-  EXPECT_EQ(reason, "expected a time-series file name ending in .csv, .txt, .tsv, .nc, .rdb, .xml, .day, .mon, .out, .hds, .ddn, .ucn, .cbc or .bud, found no ending");
+  EXPECT_EQ(reason,
+            "expected a time-series file name ending in .csv, .txt, .tsv, .nc, .rdb, .xml, .day, .mon, .out, .hds, "
+            ".ddn, .ucn, .cbc or .bud, found no ending");
 }
 
 }  // namespace
