@@ -92,7 +92,8 @@ FolderListing listFolder(const std::string& folder, std::string_view processFold
       const bool isMark = below.empty() && isOwn(name);
       const bool isProcessFolder = holdsProcessFolders && processFolders.contains(name);
       if (isMark || isProcessFolder || runMade.contains(name)) continue;
-      std::string entry = below + "/" + name;
+      std::string entry = below;
+      entry.append("/").append(name);
       const auto found = statusOf(folder + entry);
       if (!found) continue;
       if (S_ISDIR(found->st_mode)) {

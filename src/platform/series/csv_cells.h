@@ -62,7 +62,8 @@ class DateScanner final {
     if (digit(11) > 2 || digit(12) > 9 || digit(14) > 5 || digit(15) > 9) return {};
     const unsigned hour = 10 * digit(11) + digit(12);
     if (hour > 23) return {};
-    const std::int64_t second = lastDaySecond_ + std::int64_t{60 * (60 * hour + 10 * digit(14) + digit(15))};
+    const unsigned seconds = 60 * (60 * hour + 10 * digit(14) + digit(15));
+    const std::int64_t second = lastDaySecond_ + seconds;
     at += kLength;
     return second;
   }

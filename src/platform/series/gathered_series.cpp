@@ -19,7 +19,7 @@ void GatheredSeries::forget() {
   steps_.clear();
 }
 
-void GatheredSeries::gather(std::vector<Seconds> axes, std::vector<Column> columns) {
+void GatheredSeries::gather(const std::vector<Seconds>& axes, std::vector<Column> columns) {
   Seconds all;
   for (const Seconds& axis : axes) {
     if (axis == all) continue;

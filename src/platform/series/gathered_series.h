@@ -29,7 +29,7 @@ class GatheredSeries : public StoredTimeSeries {
 
   void forget();
   /// Makes the items and the common axis.
-  void gather(std::vector<Seconds> axes, std::vector<Column> columns);
+  void gather(const std::vector<Seconds>& axes, std::vector<Column> columns);
   /// Stores "source:line: expected ..., found ..." as the last error; returns false.
   bool fail(std::size_t line, std::string_view expected, std::string_view found);
   /// The same for a file that cannot be read.

@@ -1,5 +1,6 @@
 #include "platform/series/modflow_clock.h"
 
+#include <algorithm>
 #include <cmath>
 #include <filesystem>
 #include <utility>

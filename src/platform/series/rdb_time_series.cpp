@@ -239,7 +239,7 @@ void RdbTimeSeries::finish() {
     }
   }
   if (const std::string doubt = zone_.doubt(); !doubt.empty()) doubts_.push_back(sourceName_ + ": " + doubt);
-  gather(std::move(axes_), std::move(columns_));
+  gather(axes_, std::move(columns_));
 }
 
 }  // namespace mirevo

@@ -358,7 +358,7 @@ bool XmlTimeSeries::read(std::string sourceName, FileParts& parts) {
   std::vector<Column> columns;
   if (isSound && reader.finish(splitter.outline(), axes, columns)) {
     if (const std::string doubt = reader.doubt(); !doubt.empty()) doubts_.push_back(sourceName_ + ": " + doubt);
-    gather(std::move(axes), std::move(columns));
+    gather(axes, std::move(columns));
     return true;
   }
   lastError_ = fmt::format("{}:{}: {}", sourceName_, reader.faultLine() == 0 ? splitter.line() : reader.faultLine(),
