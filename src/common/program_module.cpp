@@ -39,11 +39,12 @@ void* loadModule(const ProgramModule& module, ModuleScope scope, std::string& re
     reason = fmt::format("{} cannot be loaded: {}", module.path.string(), ::dlerror());
     return nullptr;
   }
-  const auto* const version = static_cast<const char*>(symbolOf(handle, kModuleVersionName));
-  if (version == nullptr) {
+  void* const versionOf = symbolOf(handle, kModuleVersionName);
+  if (versionOf == nullptr) {
     reason = module.path.string() + " is not a part of Mirevo";
     return nullptr;
   }
+  const char* const version = reinterpret_cast<const char* (*)()>(versionOf)();
   if (std::string_view(version) != MIREVO_MODULE_VERSION) {
     reason = fmt::format("{} is of Mirevo {}, and this is {}", module.path.string(), version, MIREVO_MODULE_VERSION);
     return nullptr;

@@ -29,7 +29,7 @@ void* symbolOf(void* module, const char* name);
 /// loadModule() by name; the address of what the module exports under `symbol`, null with the reason on failure.
 const void* contentOfModule(std::string_view name, const char* symbol, std::string& reason);
 
-/// The symbol by which every module tells its version, MIREVO_MODULE_VERSION.
+/// The function by which every module tells its version, MIREVO_MODULE_VERSION. None of the modules sees another's.
 inline constexpr const char* kModuleVersionName = "mirevoModuleVersion";
 
 }  // namespace mirevo

@@ -21,11 +21,16 @@ std::uint64_t KnownResults::hashOf(std::span<const double> set) const {
 KnownResults::Step KnownResults::next(int number, std::span<const double> set) {
   if (aggregator_ == nullptr) return {};
   const std::uint64_t hash = hashOf(set);
-  // After a restart there may be rows of later evaluations, which do not answer for one whose row is lost.
+  // After a restart there may be rows of later evaluations, which do not answer for one whose row is lost; and which
+  // one answers must not depend on what runs beside it.
+  const auto running = running_.find(hash);
+  const bool isAwaited = running != running_.end() && running->second < number;
   const auto known = succeeded_.find(hash);
-  if (known != succeeded_.end() && known->second < number) return {Step::Kind::repeat, known->second};
-  const auto [running, isFirst] = running_.try_emplace(hash, number);
-  if (isFirst || running->second == number) return {};
+  if (!isAwaited && known != succeeded_.end() && known->second < number) return {Step::Kind::repeat, known->second};
+  if (running == running_.end() || running->second == number) {
+    running_.try_emplace(hash, number);
+    return {};
+  }
   waiting_[hash].push_back(number);
   return {Step::Kind::wait};
 }

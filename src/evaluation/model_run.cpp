@@ -367,6 +367,13 @@ void ModelRunner::keepOutputFiles(int slot, int number, EvaluationResult& result
   }
 }
 
+void ModelRunner::noteUnkeptFiles(EvaluationResult& result, std::string_view reason) const {
+  for (UnkeptFile& file : savedFiles_.unkept(reason)) {
+    result.warnings.push_back(file.reason);
+    result.unkeptFiles.push_back(std::move(file));
+  }
+}
+
 void ModelRunner::keepFailedFolder(int slot, int number, std::vector<std::string>& warnings) const {
   const std::string folder = launcher_.getProcessFolder(slot);
   const std::string kept = fmt::format("{}{}", description_.failedFolderPrefix, number);

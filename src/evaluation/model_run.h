@@ -62,6 +62,8 @@ class ModelRunner final {
   /// then kept only if the run has the same, and none of those that are there is replaced.
   void keepOutputFiles(int slot, int number, EvaluationResult& result,
                        std::span<const double> repeatedMeasures = {}) const;
+  /// Notes in the result that none of them was kept, and why.
+  void noteUnkeptFiles(EvaluationResult& result, std::string_view reason) const;
 
   /// Keeps a copy of the slot's folder after a failed run; adds a line to `warnings` when that is not possible.
   void keepFailedFolder(int slot, int number, std::vector<std::string>& warnings) const;

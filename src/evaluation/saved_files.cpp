@@ -85,4 +85,10 @@ std::vector<UnkeptFile> SavedFiles::save(const std::string& processFolder, int n
   return problems;
 }
 
+std::vector<UnkeptFile> SavedFiles::unkept(std::string_view reason) const {
+  std::vector<UnkeptFile> files;
+  for (const std::string& name : names_) files.push_back({name, fmt::format("{} was not kept: {}", name, reason)});
+  return files;
+}
+
 }  // namespace mirevo

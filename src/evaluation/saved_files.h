@@ -26,6 +26,8 @@ class SavedFiles final {
   /// be kept, or that the run did not write. Files that are there already are those of an interrupted run, and removed,
   /// or, with `isRepeated`, of an earlier run of the same evaluation, and stay.
   std::vector<UnkeptFile> save(const std::string& processFolder, int number, bool isRepeated = false) const;
+  /// One for each file: it was not kept, for this reason.
+  std::vector<UnkeptFile> unkept(std::string_view reason) const;
 
  private:
   std::vector<std::string> names_;  ///< below the base folder, with their leading "/"

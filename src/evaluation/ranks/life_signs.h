@@ -19,7 +19,10 @@ class LifeSigns {
 
   /// `silenceLimit`: seconds without a sign after which the master gives the set to another worker; 0: never.
   LifeSigns(Job& job, Clock clock, double silenceLimit)
-      : job_(job), clock_(std::move(clock)), interval_(std::min(silenceLimit / 8.0, kLongestInterval)) {}
+      : job_(job),
+        clock_(std::move(clock)),
+        interval_(std::min(silenceLimit / 8.0, kLongestInterval)),
+        limit_(silenceLimit) {}
 
   /// A model run begins.
   void begin() {
@@ -38,6 +41,8 @@ class LifeSigns {
     return gap;
   }
   bool wasInterrupted() const { return longestGap_ >= kLongGap; }
+  /// Whether the master may have given the set to another worker.
+  bool mayBeTakenForLost() const { return limit_ > 0.0 && longestGap_ >= 0.5 * limit_; }
 
  private:
   static constexpr double kLongestInterval = 10.0;
@@ -45,6 +50,7 @@ class LifeSigns {
   Job& job_;
   Clock clock_;
   double interval_;  ///< s; 0: no signs
+  double limit_;     ///< s; 0: none
   double lastLook_ = 0.0;
   double lastSign_ = 0.0;
   double longestGap_ = 0.0;

@@ -55,6 +55,7 @@ EvaluationResult RankEvaluator::awaitFirst() {
 void RankEvaluator::goOn() {
   const auto message = job_.receive(kMasterPollSeconds);
   if (message) handle(*message);
+  finishAnswered();  // before the loss of the worker that answered ends the run
   passOnLost();
   finishAnswered();
   stopIfCancelled();
@@ -120,7 +121,7 @@ void RankEvaluator::handle(const Message& message) {
     case RankMessage::alive:
       return;
     case RankMessage::failure:
-      failWith(message.rank, decodeFailure(message.content));
+      return takeFailure(message.rank, decodeFailure(message.content));
     default:
       fatalError(kCommunicationFailed,
                  fmt::format("the worker with rank {} sent a message of unknown kind {}", message.rank, message.tag));
@@ -131,13 +132,15 @@ void RankEvaluator::takeResult(int rank, ResultMessage message) {
   const WorkerWatch::Held held = takeHeld(rank);
   noteEnd(rank);
   for (const std::string& text : std::exchange(message.warnings, {})) observer_.warning(text);
-  if (isFirst(rank)) {
+  const bool isOfAnother = worker(rank).isLate && worker(rank).set;
+  if (isFirst(rank, message.result.ok() && message.result.unkeptFiles.empty())) {
     worker(rank).answer = std::move(message);
     answered_.insert(rank);
   } else {
     worker(rank).set.reset();
-    observer_.message(fmt::format("The result of evaluation No. {} from {} is dropped: another worker had it first",
-                                  held.number, nameOf(rank)));
+    observer_.message(fmt::format(
+        "The result of evaluation No. {} from {} is dropped: {}", held.number, nameOf(rank),
+        isOfAnother ? "the worker was taken for lost, and another makes the run" : "another worker had it first"));
   }
   noteWhetherFree(rank);
 }
@@ -146,11 +149,12 @@ void RankEvaluator::noteEnd(int rank) {
   if (std::exchange(worker(rank).isRunning, false)) ledger_.markEnded();
 }
 
-bool RankEvaluator::isFirst(int rank) {
+bool RankEvaluator::isFirst(int rank, bool isWhole) {
   Worker& answering = worker(rank);
   if (!std::exchange(answering.isLate, false)) return answering.set.has_value();
   late_.erase(rank);
-  if (!answering.set) return false;
+  // A failure, or files that were not kept, may be for the loss: whoever has the set now decides.
+  if (!answering.set || !isWhole) return false;
   if (ledger_.takeAgain(*answering.set)) return true;
   for (int other = 1; other < job_.processCount(); ++other) {
     if (other == rank || worker(other).set != answering.set || worker(other).isLate) continue;
@@ -160,14 +164,34 @@ bool RankEvaluator::isFirst(int rank) {
   return true;
 }
 
+/// Of a worker whose set is another's by now it ends that worker alone.
+void RankEvaluator::takeFailure(int rank, const FailureMessage& failure) {
+  Worker& failed = worker(rank);
+  const bool hasNothing = failed.isLate || (watch_.heldBy(rank) && !failed.set);
+  if (!hasNothing) failWith(rank, failure);
+  watch_.takeBack(rank);
+  noteEnd(rank);
+  late_.erase(rank);
+  failed.isLate = false;
+  failed.set.reset();
+  failed.isGivenUp = true;
+  noteWhetherFree(rank);
+  observer_.warning(
+      fmt::format("W{} runs no model any more: {}\n{}", nameOf(rank).substr(1), failure.message, failure.detail));
+  if (!isAnyLeft()) failWith(rank, failure);
+}
+
 void RankEvaluator::passOnLost() {
   const std::vector<int> found = watch_.findLost();
   for (const int rank : found) loseWorker(rank);
-  if (found.empty()) return;
+  if (!found.empty() && !isAnyLeft()) failWithoutWorkers();
+}
+
+bool RankEvaluator::isAnyLeft() {
   for (int rank = 1; rank < job_.processCount(); ++rank) {
-    if (!worker(rank).isGivenUp && !watch_.isLost(rank)) return;
+    if (!worker(rank).isGivenUp && !watch_.isLost(rank)) return true;
   }
-  failWithoutWorkers();
+  return false;
 }
 
 void RankEvaluator::loseWorker(int rank) {
@@ -191,8 +215,10 @@ void RankEvaluator::loseWorker(int rank) {
 void RankEvaluator::failWithoutWorkers() const {
   std::string detail;
   for (int rank = 1; rank < job_.processCount(); ++rank) {
-    const char* why = watch_.hasEnded(rank) ? "its process has ended" : "it gives no sign of life";
-    if (watch_.isLost(rank)) detail += fmt::format("{}: {}\n", nameOf(rank), why);
+    const char* why = watch_.hasEnded(rank) ? "its process has ended"
+                      : watch_.isLost(rank) ? "it gives no sign of life"
+                                            : "its process folder cannot be used";
+    detail += fmt::format("{}: {}\n", nameOf(rank), why);
   }
   fatalError("Error: All workers of the job are lost", detail + "Restart = 1 goes on with what has been evaluated");
 }
@@ -248,6 +274,7 @@ void RankEvaluator::giveUp(int rank, const GivenUpMessage& message) {
     failWithoutSlots(damage);
   }
   observer_.warning(givenUpWarning(fmt::format("Worker {}", rank), damage));
+  if (!isAnyLeft()) failWithoutWorkers();
 }
 
 void RankEvaluator::freeOneThatWaits() {

@@ -58,9 +58,11 @@ class RankEvaluator final : public Evaluator {
   /// The set that the worker has answered. Throws FatalError if it has none.
   WorkerWatch::Held takeHeld(int rank);
   /// The worker, which was lost, has a result. False if another one was first; others that run the set are now late.
-  bool isFirst(int rank);
+  bool isFirst(int rank, bool isWhole);
   /// Puts the sets of workers that are lost back. Throws FatalError when no worker is left.
   void passOnLost();
+  bool isAnyLeft();
+  void takeFailure(int rank, const FailureMessage& failure);
   void loseWorker(int rank);
   /// Throws FatalError.
   [[noreturn]] void failWithoutWorkers() const;

@@ -89,10 +89,18 @@ std::optional<ResultMessage> runModel(Job& job, ModelRunner& runner, const SetMe
 /// A worker that was itself stopped, or kept waiting, may have found that the time of the run was over, which is no
 /// fault of the run: it is made once more.
 std::optional<ResultMessage> runUndisturbed(Job& job, ModelRunner& runner, const SetMessage& message,
-                                            MasterWatch& watch, LifeSigns& signs) {
+                                            MasterWatch& watch, LifeSigns& signs, std::vector<std::string>& warnings) {
   auto answer = runModel(job, runner, message, watch, signs);
-  if (answer && !answer->result.ok() && signs.wasInterrupted()) answer = runModel(job, runner, message, watch, signs);
-  if (answer) runner.keepOutputFiles(kSlot, message.number, answer->result, message.repeatedMeasures);
+  if (answer && !answer->result.ok() && signs.wasInterrupted() && !runner.renewIfDamaged(kSlot, warnings)) {
+    answer = runModel(job, runner, message, watch, signs);
+  }
+  if (!answer) return answer;
+  if (signs.mayBeTakenForLost()) {
+    // Another worker may have kept those of its own run of this set.
+    runner.noteUnkeptFiles(answer->result, "the process was stopped or kept waiting");
+  } else {
+    runner.keepOutputFiles(kSlot, message.number, answer->result, message.repeatedMeasures);
+  }
   return answer;
 }
 
@@ -121,7 +129,7 @@ void runWorkerLoop(Job& job, ModelRunner& runner, MasterWatch& watch, LifeSigns&
                                          damage->isFinal}));
       continue;
     }
-    auto result = runUndisturbed(job, runner, decodeSet(message.content), watch, signs);
+    auto result = runUndisturbed(job, runner, decodeSet(message.content), watch, signs, warnings);
     if (!result) return;
     result->warnings = std::exchange(warnings, {});
     sendToMaster(job, RankMessage::result, encode(*result));

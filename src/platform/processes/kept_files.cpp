@@ -96,8 +96,9 @@ class CopyRecords final {
 
 /// Whether two files can be read and have the same content.
 bool haveSameContent(const std::string& one, const std::string& other, const std::function<void()>& look) {
-  const std::array<Descriptor, 2> files{Descriptor(::open(one.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW)),
-                                        Descriptor(::open(other.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW))};
+  const std::array<Descriptor, 2> files{
+      Descriptor(::open(one.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK)),
+      Descriptor(::open(other.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK))};
   std::array<std::vector<char>, 2> parts{std::vector<char>(kCompared), std::vector<char>(kCompared)};
   const auto readPart = [&files, &parts](std::size_t which) -> ssize_t {
     std::size_t filled = 0;

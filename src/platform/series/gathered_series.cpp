@@ -20,8 +20,20 @@ void GatheredSeries::forget() {
 }
 
 void GatheredSeries::gather(const std::vector<Seconds>& axes, std::vector<Column> columns) {
+  std::vector<bool> isWanted(axes.size(), wanted_.empty());
+  for (const int item : wanted_) {
+    const auto place = static_cast<std::size_t>(item) - 1;
+    if (place < columns.size()) isWanted[columns[place].axis] = true;
+  }
+  if (std::find(isWanted.begin(), isWanted.end(), true) == isWanted.end()) isWanted.assign(axes.size(), true);
   Seconds all;
-  for (const Seconds& axis : axes) {
+  const Seconds* first = nullptr;
+  bool differ = false;
+  for (std::size_t i = 0; i < axes.size(); ++i) {
+    const Seconds& axis = axes[i];
+    if (!isWanted[i]) continue;
+    if (first == nullptr) first = &axis;
+    differ = differ || axis != *first;
     if (axis == all) continue;
     Seconds merged;
     merged.reserve(all.size() + axis.size());
@@ -33,12 +45,18 @@ void GatheredSeries::gather(const std::vector<Seconds>& axes, std::vector<Column
   for (const std::int64_t second : all) {
     times_.push_back(static_cast<double>(second - startSecond_) / static_cast<double>(kSecondsOfDay));
   }
-  for (const Seconds& axis : axes) {
+  if (differ && !wanted_.empty()) {
+    doubts_.push_back(sourceName_ +
+                      ": the series that are read have times of their own, and none has a value at those of another "
+                      "alone: it is not interpolated there. A file for each gives each its own times");
+  }
+  for (std::size_t i = 0; i < axes.size(); ++i) {
     std::vector<std::uint32_t>& steps = steps_.emplace_back();
-    steps.reserve(axis.size());
+    if (!isWanted[i]) continue;
+    steps.reserve(axes[i].size());
     auto step = all.begin();
-    for (const std::int64_t second : axis) {
-      step = std::find(step, all.end(), second);
+    for (const std::int64_t second : axes[i]) {
+      step = std::lower_bound(step, all.end(), second);
       steps.push_back(static_cast<std::uint32_t>(step - all.begin()));
     }
   }

@@ -17,6 +17,8 @@ class GatheredSeries : public StoredTimeSeries {
   /// NaN: what marks missing values in the file is replaced by it.
   std::optional<float> deleteValue() const final { return std::numeric_limits<float>::quiet_NaN(); }
   std::vector<std::string> doubts() const final { return doubts_; }
+  /// The axis then has the times of these alone, so that others leave no gaps in them.
+  void willRead(std::span<const int> items) final { wanted_.assign(items.begin(), items.end()); }
 
  protected:
   using Seconds = std::vector<std::int64_t>;  ///< secondNumber()s, strictly increasing
@@ -43,6 +45,7 @@ class GatheredSeries : public StoredTimeSeries {
   bool readItem(std::size_t place) final;
   std::vector<double> readExactItem(std::size_t place) final;
 
+  std::vector<int> wanted_;                        ///< items that are read; none: all
   std::vector<std::vector<double>> values_;        ///< of each item, at the times of its own axis
   std::vector<std::size_t> axisOf_;                ///< of each item
   std::vector<std::vector<std::uint32_t>> steps_;  ///< of each axis: the steps of its times on the common one

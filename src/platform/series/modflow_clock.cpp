@@ -21,8 +21,11 @@ constexpr std::int64_t kUsualStart = dayNumber(2000, 1, 1) * kSecondsOfDay;
 
 std::vector<std::string_view> wordsOf(std::string_view line) {
   std::vector<std::string_view> words;
-  for (const std::string_view word : splitAt(trim(line), ' ')) {
-    if (!trim(word).empty()) words.push_back(trim(word));
+  constexpr std::string_view kBlanks = " \t\r";
+  for (std::size_t begin = line.find_first_not_of(kBlanks); begin != std::string_view::npos;) {
+    const std::size_t end = std::min(line.find_first_of(kBlanks, begin), line.size());
+    words.push_back(line.substr(begin, end - begin));
+    begin = line.find_first_not_of(kBlanks, end);
   }
   return words;
 }

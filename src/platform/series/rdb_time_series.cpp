@@ -120,7 +120,7 @@ bool RdbTimeSeries::readFormats(std::string_view line, std::size_t number) {
   }
   const auto columnOf = [&](std::string_view name) {
     const auto found = std::find(table_.names.begin(), table_.names.end(), name);
-    return found == table_.names.end() ? 0 : static_cast<std::size_t>(found - table_.names.begin());
+    return found == table_.names.end() ? kNoColumn : static_cast<std::size_t>(found - table_.names.begin());
   };
   const auto letterOf = [&](std::size_t column) { return toLowerAscii(trim(formats[column])).back(); };
   std::size_t time = 0;
@@ -130,14 +130,14 @@ bool RdbTimeSeries::readFormats(std::string_view line, std::size_t number) {
   table_.site = columnOf("site_no");
   const std::string& name = table_.names[time];
   if (name.ends_with("_dt")) table_.timeOfDay = columnOf(name.substr(0, name.size() - 2) + "tm");
-  for (std::size_t column = 1; column < formats.size(); ++column) {
+  for (std::size_t column = 0; column < formats.size(); ++column) {
     const std::string& each = table_.names[column];
     if (each == "tz_cd" || each.ends_with("_tz_cd")) table_.zone = column;
     if (column == time || column == table_.site || column == table_.timeOfDay) continue;
     if (letterOf(column) != 'n' && !each.ends_with("_va")) continue;
     const std::string stem = each.ends_with("_va") ? each.substr(0, each.size() - 3) : each;
     table_.items.emplace_back(column, false);
-    if (const std::size_t code = columnOf(stem + "_cd"); code != 0) table_.items.emplace_back(code, true);
+    if (const std::size_t code = columnOf(stem + "_cd"); code != kNoColumn) table_.items.emplace_back(code, true);
   }
   return !table_.items.empty() || fail(number, "a column of values, of format n", quotedForMessage(line));
 }
@@ -160,12 +160,12 @@ bool RdbTimeSeries::readRow(std::string_view line, std::size_t number) {
     return fail(number, columnsText(table_.names.size()) + " as in the row of names", std::to_string(cells.size()));
   }
   std::string text(trim(cells[table_.time]));
-  if (table_.timeOfDay != 0 && !trim(cells[table_.timeOfDay]).empty()) {
+  if (table_.timeOfDay != kNoColumn && !trim(cells[table_.timeOfDay]).empty()) {
     text += fmt::format(" {}", trim(cells[table_.timeOfDay]));
   }
   auto time = parseZonedTime(text);
   if (!time) return fail(number, "a valid time like 2001-01-31 12:30", quotedForMessage(text));
-  if (table_.zone != 0) {
+  if (table_.zone != kNoColumn) {
     const std::string_view zone = trim(cells[table_.zone]);
     if (firstZone_.empty()) firstZone_ = zone;
     time->offsetMinutes = offsetOfZone(zone);
@@ -176,7 +176,7 @@ bool RdbTimeSeries::readRow(std::string_view line, std::size_t number) {
   }
   const auto second = zone_.take(*time);
   if (!second) return fail(number, "times that all have a known zone, or none", quotedForMessage(text));
-  const std::size_t axis = axisOfSite(table_.site == 0 ? std::string() : std::string(trim(cells[table_.site])));
+  const std::size_t axis = axisOfSite(table_.site == kNoColumn ? std::string() : std::string(trim(cells[table_.site])));
   Seconds& seconds = axes_[axis];
   if (!seconds.empty() && *second <= seconds.back()) {
     return fail(number, "a time later than that of the row before", quotedForMessage(text));

@@ -34,12 +34,13 @@ class RdbTimeSeries final : public GatheredSeries {
   static bool fits(std::string_view head);
 
  private:
+  static constexpr std::size_t kNoColumn = static_cast<std::size_t>(-1);
   struct Table {
     std::vector<std::string> names;
     std::size_t time = 0;
-    std::size_t timeOfDay = 0;                        ///< 0: none
-    std::size_t site = 0;                             ///< 0: none
-    std::size_t zone = 0;                             ///< 0: none
+    std::size_t timeOfDay = kNoColumn;
+    std::size_t site = kNoColumn;
+    std::size_t zone = kNoColumn;
     std::vector<std::pair<std::size_t, bool>> items;  ///< column, and whether it has qualifiers
   };
   struct Site {

@@ -17,6 +17,7 @@ constexpr std::int32_t kOldest = 51000;    ///< earlier versions number their va
 constexpr std::uint64_t kHeadNumbers = 7;  ///< magic, version, flow units, and the counts of four kinds
 constexpr std::uint64_t kEndBytes = 24;    ///< three places, number of records, error code, magic
 constexpr std::size_t kMostObjects = 10'000'000;
+constexpr std::uint64_t kLeastName = 4;  ///< bytes of a name: its length comes first
 constexpr std::int64_t kDayZero = dayNumber(1899, 12, 30);
 
 constexpr std::array<std::string_view, 4> kKindNames = {"subcatchment", "node", "link", "system"};
@@ -111,10 +112,11 @@ bool SwmmResults::readHeader() {
   if (flowUnits_ < 0 || flowUnits_ > 5) {
     return fail(fmt::format("expected a code of flow units from 0 to 5 at byte 8, found {}", flowUnits_));
   }
+  std::uint64_t total = 0;
   for (std::size_t i = 0; i < kKinds; ++i) {
     const std::int32_t count = (*head)[3 + i];
     if (count < 0 || static_cast<std::size_t>(count) > kMostObjects ||
-        static_cast<std::uint64_t>(count) > file_.size()) {
+        (total += static_cast<std::uint64_t>(count)) > file_.size() / kLeastName) {
       return fail(fmt::format("expected a number of objects at byte {}, found {}", 12 + 4 * i, count));
     }
     if (i < kSystem)

@@ -59,6 +59,9 @@ bool XmlSplitter::takeText(std::string_view text) {
     return refuse(fmt::format("expected {}, found {}", isEnded_ ? "the end of the document" : "an XML document",
                               quotedForMessage(text.substr(other))));
   }
+  // Blanks between the points of a long series.
+  const bool isBlank = text.find_first_not_of(" \t\r\n") == std::string_view::npos;
+  if (isBlank && !isInPoint() && localName(open_.back()) == names_.container) return true;
   target() += text;
   if (outline_.size() > kLongestOutline) return refuse("it has too much that is no time series");
   return points_.size() < 4 * kHandedOver || refuse("a point is too long");

@@ -142,9 +142,13 @@ void raiseBudget(const Task& task, int earlierBudget, EarlierRun& run) {
 
 /// Drops the failed evaluations after the last successful one: their cause may have been removed since.
 void dropFailuresAtEnd(EarlierRun& run) {
+  // A row that repeats another is no sign of a model that works again.
   std::size_t kept = run.rows.size();
-  while (kept > 0 && !run.rows.isOk(kept - 1)) --kept;
-  const std::size_t count = run.rows.size() - kept;
+  const auto isSuccess = [&run](std::size_t i) { return run.rows.isOk(i) && run.rows.repeats(i).value_or(0) == 0; };
+  while (kept > 0 && !isSuccess(kept - 1)) --kept;
+  while (kept < run.rows.size() && run.rows.isOk(kept)) ++kept;
+  std::size_t count = 0;
+  for (std::size_t i = kept; i < run.rows.size(); ++i) count += run.rows.isOk(i) ? 0 : 1;
   run.rows.keepIf([kept](std::size_t i) { return i < kept; });
   run.notes.push_back(fmt::format("Restart = 2: {} failed evaluations at the end are made again", count));
 }

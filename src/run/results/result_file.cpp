@@ -37,6 +37,7 @@ std::string commentLines(std::span<const std::string> texts) {
 void ResultFile::open(const std::string& path, std::span<const std::string> headLines, const ResultColumns& columns,
                       const ResultRows& earlierRows) {
   rows_.clear();
+  indexOf_.clear();
   earlierAggregates_.clear();
   aggregates_.clear();
   columns_ = columns;
@@ -82,20 +83,14 @@ void ResultFile::addRow(ResultRow row) {
 void ResultFile::addPlace(const ResultRow& row, std::int64_t offset, std::string_view line) {
   rows_.push_back(
       {offset, checksumOf(line), row.number, static_cast<std::uint32_t>(line.size() + 1), row.repeats.value_or(0) > 0});
+  const auto number = static_cast<std::size_t>(row.number);
+  if (indexOf_.size() <= number) indexOf_.resize(number + 1);
+  if (indexOf_[number] == 0) indexOf_[number] = static_cast<std::uint32_t>(rows_.size());
 }
 
-/// Rows are nearly in the order of their numbers.
 const ResultFile::Place* ResultFile::placeOf(int number) const {
-  const std::ptrdiff_t count = std::ssize(rows_);
-  const std::ptrdiff_t guess = std::min<std::ptrdiff_t>(number, count) - 1;
-  for (std::ptrdiff_t away = 0; guess - away >= 0 || guess + away < count; ++away) {
-    for (const std::ptrdiff_t i : {guess - away, guess + away}) {
-      if (i >= 0 && i < count && rows_[static_cast<std::size_t>(i)].number == number) {
-        return &rows_[static_cast<std::size_t>(i)];
-      }
-    }
-  }
-  return nullptr;
+  const auto index = static_cast<std::size_t>(number);
+  return index < indexOf_.size() && indexOf_[index] > 0 ? &rows_[indexOf_[index] - 1] : nullptr;
 }
 
 bool ResultFile::isRepeat(int number) const {

@@ -76,6 +76,7 @@ class ResultFile final {
   ResultColumns columns_;
   std::int64_t headLength_ = 0;
   std::vector<Place> rows_;
+  std::vector<std::uint32_t> indexOf_;                     ///< by number: the place in rows_, from 1; 0: none
   std::vector<std::pair<int, double>> earlierAggregates_;  ///< of the rows of an earlier run, by number
   std::map<int, double> aggregates_;                       ///< those that are to be changed, by number
 };

@@ -380,6 +380,44 @@ TEST_F(RankEvaluatorTest, TheSetOfAWorkerThatIsGivenUpIsAnothersUntilNoneIsLeft)
                          "left"));
 }
 
+TEST_F(RankEvaluatorTest, ARunEndsWhenOfTheWorkersSomeAreLostAndTheOthersGivenUp) {
+  RankEvaluator& master = makeMaster();
+  becomeReady(1);
+  becomeReady(2);
+  job_.onReceive = [this](double) {
+    ASSERT_LT(now_ += 0.25, 60.0);
+    job_.ended = {1};
+    if (now_ < 5.0 || running_.erase(2) == 0) return;
+    job_.deliver(2, RankMessage::givenUp, encode(GivenUpMessage{"Unable to open x", "no such file", {}}));
+  };
+  EXPECT_THAT(refusalOf([&] {
+                evaluate(master, {4.0, 2.0, 3.0});
+              }),
+              AllOf(StartsWith("Error: All workers of the job are lost\n"), HasSubstr("worker 1 on node: its process"),
+                    HasSubstr("worker 2 on node: its process folder cannot be used")));
+}
+
+TEST_F(RankEvaluatorTest, AFailureOfAWorkerThatWasTakenForLostDoesNotCount) {
+  RankEvaluator& master = makeMaster();
+  becomeReady(1);
+  becomeReady(2);
+  job_.onReceive = [&, hasFailed = false](double) mutable {
+    if (!job_.arriving.empty()) return;
+    ASSERT_LT(now_ += 0.25, 60.0);
+    job_.deliver(2, RankMessage::alive, {});
+    if (now_ >= 12.0 && !std::exchange(hasFailed, true)) {
+      EvaluationResult failed;
+      failed.failure = EvaluationFailure{EvaluationFailure::Kind::exitCode, "run.sh exited with code 1"};
+      job_.deliver(1, RankMessage::result, encode(ResultMessage{failed, {}, {}}));
+      running_.erase(1);
+    }
+    if (running_.contains(2) && (now_ == 4.0 || now_ >= 16.0)) answer(2);
+  };
+  EXPECT_THAT(measuresOf(evaluate(master, {4.0, 2.0})), ElementsAre(3.0, 1.0));
+  EXPECT_EQ(failedRuns_->failedCount(), 0);
+  EXPECT_THAT(observer_.events, testing::Contains(HasSubstr("taken for lost, and another makes the run")));
+}
+
 class SetGivenBackTest : public RankEvaluatorTest, public testing::WithParamInterface<bool> {};
 
 TEST_P(SetGivenBackTest, IsRunByTheWorkerWhoseOwnResultWaitsForIt) {

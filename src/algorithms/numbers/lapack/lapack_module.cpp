@@ -10,8 +10,9 @@ void ilaver_(int* major, int* minor, int* patch) __attribute__((weak));
 char* openblas_get_config() __attribute__((weak));
 void openblas_set_num_threads(int count) __attribute__((weak));
 
-extern const char mirevoModuleVersion[];
-const char mirevoModuleVersion[] = MIREVO_MODULE_VERSION;
+const char* mirevoModuleVersion() {
+  return MIREVO_MODULE_VERSION;
+}
 
 extern const mirevo::LapackFunctions mirevoLapackFunctions;
 const mirevo::LapackFunctions mirevoLapackFunctions = {

@@ -317,8 +317,9 @@ void MpiJob::end(int exitCode) {
 extern "C" {
 
 /// The program refuses a module of another version.
-extern const char mirevoModuleVersion[];
-const char mirevoModuleVersion[] = MIREVO_MODULE_VERSION;
+const char* mirevoModuleVersion() {
+  return MIREVO_MODULE_VERSION;
+}
 
 Job* mirevoJoinMpiJob() {
   // MPI_Finalize spins; several processes may share a core.

@@ -7,8 +7,9 @@ extern "C" {
 /// Of HDF5, where NetCDF is linked with it.
 int H5get_libversion(unsigned* major, unsigned* minor, unsigned* release) __attribute__((weak));
 
-extern const char mirevoModuleVersion[];
-const char mirevoModuleVersion[] = MIREVO_MODULE_VERSION;
+const char* mirevoModuleVersion() {
+  return MIREVO_MODULE_VERSION;
+}
 
 extern const mirevo::NetcdfFunctions mirevoNetcdfFunctions;
 const mirevo::NetcdfFunctions mirevoNetcdfFunctions = {
