@@ -72,7 +72,8 @@ std::string SlotUse::text(int slotCount, std::string_view what) const {
                   what, 100.0 * *share);
   const double even = evenness(slotCount);
   std::vector<int> numbers = evenNumbers();
-  if (even >= kEven || numbers.empty()) return text;
+  // Of a part without batches, or of run times that differ, the batches say nothing.
+  if (even >= kEven || numbers.empty() || hasParts_ || *share > even) return text;
   // Those around the number of slots that there are.
   const auto distance = [slotCount](int number) { return std::abs(number - slotCount); };
   std::ranges::stable_sort(numbers, {}, distance);

@@ -18,7 +18,10 @@ class SlotUse final {
   /// What has been started since the last call was a batch: all of it ended before anything else began.
   void endBatch();
   /// What has been started since the last call was none.
-  void endPart() { startedCount_ = 0; }
+  void endPart() {
+    hasParts_ = hasParts_ || startedCount_ > 0;
+    startedCount_ = 0;
+  }
 
   /// The share of the time between the start of the first and the end of the last model run in which a slot had one;
   /// empty before a run has ended.
@@ -40,6 +43,7 @@ class SlotUse final {
   double busyUntilLastEnd_ = 0.0;
   std::optional<double> lastEnd_;
   bool hasStarted_ = false;
+  bool hasParts_ = false;  ///< model runs were made that belong to no batch
   std::map<int, int> batches_;  ///< number of batches by their model runs
 };
 

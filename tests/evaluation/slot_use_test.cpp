@@ -43,20 +43,24 @@ TEST(SlotUse, NamesTheNumbersOfSlotsThatDivideTheBatchesEvenly) {
        7.0 / 8.0,
        "; its batches of 7 model runs fill at most 88 % of it, and 7 slots would divide them evenly"},
       {{1, 1, 1}, 4, 0.25, " model run"},
-      {{}, 4, 1.0, " model run"},
   };
   for (const auto& [batches, slots, evenness, end] : cases) {
     SlotUse use;
-    use.runStarted(0.0);
-    use.endPart();
-    use.runEnded(1.0);
+    double now = 0.0;
     for (const int runs : batches) {
-      for (int i = 0; i < runs; ++i) use.runStarted(1.0);
-      for (int i = 0; i < runs; ++i) use.runEnded(1.0);
+      for (int i = 0; i < runs; ++i) {
+        use.runStarted(now);
+        if (i == 0) now += 1.0;  // and the others no time
+        use.runEnded(now);
+      }
       use.endBatch();
     }
     EXPECT_DOUBLE_EQ(use.evenness(slots), evenness);
     EXPECT_TRUE(use.text(slots, "slots").ends_with(end)) << use.text(slots, "slots");
+    use.runStarted(now);
+    use.endPart();
+    use.runEnded(now + 1.0);
+    EXPECT_TRUE(use.text(slots, "slots").ends_with(" model run")) << "not all of the runs were in batches";
   }
 }
 
