@@ -43,7 +43,7 @@ class SlotUse final {
   double busyUntilLastEnd_ = 0.0;
   std::optional<double> lastEnd_;
   bool hasStarted_ = false;
-  bool hasParts_ = false;  ///< model runs were made that belong to no batch
+  bool hasParts_ = false;       ///< model runs were made that belong to no batch
   std::map<int, int> batches_;  ///< number of batches by their model runs
 };
 
