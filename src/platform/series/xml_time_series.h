@@ -12,11 +12,11 @@ namespace mirevo {
 
 struct SeriesReading;
 
-/// Series in XML: WaterML 1.1 (CUAHSI, "WaterML 1.1 Schema and Specification", and the services of the USGS), WaterML
-/// 2.0 Part 1 (OGC 10-126r4: time-value pairs, "MeasurementTVP") and PI-XML (Deltares, "Delft-FEWS Published Interface:
-/// timeseries", schema pi_timeseries.xsd). The root element tells which. One item for each of their series, in file
-/// order, and after it its qualifiers, censoring or flags as quality codes, if it has any. The file is read a part at a
-/// time (XmlSplitter), times and values are kept.
+/// Series in XML: WaterML 1.1 (CUAHSI's schema, and the services of the USGS), WaterML 2.0 time series (OGC 10-126r4:
+/// time-value pairs, "MeasurementTVP") and PI-XML (Deltares, "Delft-FEWS Published Interface: timeseries", schema
+/// pi_timeseries.xsd). The root element tells which. One item for each of their series, in file order, and after it its
+/// qualifiers, censoring or flags as quality codes, if it has any. The file is read a part at a time (XmlSplitter),
+/// times and values are kept.
 class XmlTimeSeries final : public GatheredSeries {
  public:
   explicit XmlTimeSeries(std::shared_ptr<SeriesReading> reading = nullptr) : reading_(std::move(reading)) {}
