@@ -91,7 +91,7 @@ const SearchFacts& OpseMethod::facts() const {
 BoundSection OpseMethod::section() {
   static const SettingSection<OpseMethod> section = [] {
     SettingSection<OpseMethod> made{{"OPTIMISATION_ALGORITHM/OPSE_CONTROL_PARAMETERS",
-                                     "when `Algorithm_Type` is 'OPSE'", "Overlapping Population Simplex Evolution.",
+                                     "when `Algorithm_Type` is `'OPSE'`", "Overlapping Population Simplex Evolution.",
                                      pseKeywordRows<OpseMethod>()}};
     made.row.keywords.push_back(setting<OpseMethod>(
         [](auto& m) -> auto& { return m.settings.setsInFlight; },

@@ -164,7 +164,6 @@ bool RankEvaluator::isFirst(int rank, bool isWhole) {
   return true;
 }
 
-/// Of a worker whose set is another's by now it ends that worker alone.
 void RankEvaluator::takeFailure(int rank, const FailureMessage& failure) {
   Worker& failed = worker(rank);
   const bool hasNothing = failed.isLate || (watch_.heldBy(rank) && !failed.set);
@@ -187,9 +186,9 @@ void RankEvaluator::passOnLost() {
   if (!found.empty() && !isAnyLeft()) failWithoutWorkers();
 }
 
-bool RankEvaluator::isAnyLeft() {
+bool RankEvaluator::isAnyLeft() const {
   for (int rank = 1; rank < job_.processCount(); ++rank) {
-    if (!worker(rank).isGivenUp && !watch_.isLost(rank)) return true;
+    if (!workers_.at(static_cast<std::size_t>(rank - 1)).isGivenUp && !watch_.isLost(rank)) return true;
   }
   return false;
 }

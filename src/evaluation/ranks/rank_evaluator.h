@@ -57,11 +57,14 @@ class RankEvaluator final : public Evaluator {
   void noteEnd(int rank);
   /// The set that the worker has answered. Throws FatalError if it has none.
   WorkerWatch::Held takeHeld(int rank);
-  /// The worker, which was lost, has a result. False if another one was first; others that run the set are now late.
+  /// Whether the result of the worker counts. If it was taken for lost: only one that `isWhole` and comes before that
+  /// of another, whose own then does not count any more.
   bool isFirst(int rank, bool isWhole);
   /// Puts the sets of workers that are lost back. Throws FatalError when no worker is left.
   void passOnLost();
-  bool isAnyLeft();
+  /// Whether a worker can still be given a set.
+  bool isAnyLeft() const;
+  /// Throws FatalError unless the set of the worker is another's by now and others are left: it then runs no more.
   void takeFailure(int rank, const FailureMessage& failure);
   void loseWorker(int rank);
   /// Throws FatalError.

@@ -11,13 +11,13 @@
 namespace mirevo {
 
 /// A file whose items may have times of their own, as exchange formats with several gauges have. The axis has the times
-/// of all; an item is missing where it has none.
+/// of all that will be read; an item is missing where it has none.
 class GatheredSeries : public StoredTimeSeries {
  public:
   /// NaN: what marks missing values in the file is replaced by it.
   std::optional<float> deleteValue() const final { return std::numeric_limits<float>::quiet_NaN(); }
   std::vector<std::string> doubts() const final { return doubts_; }
-  /// The axis then has the times of these alone, so that others leave no gaps in them.
+  /// The axis then has the times of these alone, so that others leave no gaps in them; others have no values.
   void willRead(std::span<const int> items) final { wanted_.assign(items.begin(), items.end()); }
 
  protected:
