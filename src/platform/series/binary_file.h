@@ -1,10 +1,10 @@
 #pragma once
 
 #include <cstdint>
-#include <cstring>
 #include <memory>
 #include <optional>
 #include <string>
+#include <string_view>
 #include <type_traits>
 #include <vector>
 
@@ -72,5 +72,13 @@ class BinaryFile final {
   std::uint64_t size_ = 0;
   std::string fault_;
 };
+
+/// Whether the bytes, the first ones of a file, begin with this number.
+inline bool beginsWith(std::string_view head, std::int32_t number) {
+  std::int32_t first = 0;
+  if (head.size() < sizeof first) return false;
+  std::memcpy(&first, head.data(), sizeof first);
+  return first == number;
+}
 
 }  // namespace mirevo

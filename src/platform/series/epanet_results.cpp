@@ -1,7 +1,6 @@
 #include "platform/series/epanet_results.h"
 
 #include <array>
-#include <cstring>
 
 #include <fmt/core.h>
 
@@ -47,10 +46,7 @@ constexpr std::array<std::string_view, kNodeResults + kLinkResults> kResults = {
 }  // namespace
 
 bool EpanetResults::fits(std::string_view head) {
-  std::int32_t magic = 0;
-  if (head.size() < sizeof magic) return false;
-  std::memcpy(&magic, head.data(), sizeof magic);
-  return magic == kMagic;
+  return beginsWith(head, kMagic);
 }
 
 bool EpanetResults::readHeader() {

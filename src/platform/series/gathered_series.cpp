@@ -8,6 +8,23 @@
 
 namespace mirevo {
 
+bool GatheredSeries::open(const std::string& fileName) {
+  FileParts parts(fileName, reading_);
+  return readAll(fileName, parts);
+}
+
+bool GatheredSeries::parse(std::string sourceName, std::string_view content) {
+  FileParts parts(content);
+  return readAll(std::move(sourceName), parts);
+}
+
+bool GatheredSeries::readAll(std::string sourceName, FileParts& parts) {
+  forget();
+  sourceName_ = std::move(sourceName);
+  endsLine_ = true;
+  return read(parts);
+}
+
 void GatheredSeries::forget() {
   lastError_.clear();
   doubts_.clear();

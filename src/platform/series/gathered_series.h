@@ -2,10 +2,14 @@
 
 #include <cstdint>
 #include <limits>
+#include <memory>
 #include <span>
 #include <string>
+#include <string_view>
+#include <utility>
 #include <vector>
 
+#include "platform/series/file_parts.h"
 #include "platform/series/stored_time_series.h"
 
 namespace mirevo {
@@ -14,6 +18,10 @@ namespace mirevo {
 /// of all that will be read; an item is missing where it has none.
 class GatheredSeries : public StoredTimeSeries {
  public:
+  bool open(const std::string& fileName) final;
+  /// The same for content in memory; `sourceName` is used in messages.
+  bool parse(std::string sourceName, std::string_view content);
+  bool endsLine() const final { return endsLine_; }
   /// NaN: what marks missing values in the file is replaced by it.
   std::optional<float> deleteValue() const final { return std::numeric_limits<float>::quiet_NaN(); }
   std::vector<std::string> doubts() const final { return doubts_; }
@@ -29,7 +37,11 @@ class GatheredSeries : public StoredTimeSeries {
     std::vector<double> values = {};  ///< one per time, NaN where one is missing
   };
 
-  void forget();
+  explicit GatheredSeries(std::shared_ptr<SeriesReading> reading) : reading_(std::move(reading)) {}
+
+  /// Reads a file from its beginning, when nothing of another one is left, and gathers its series; false, with fail(),
+  /// if it is none of the format.
+  virtual bool read(FileParts& parts) = 0;
   /// Makes the items and the common axis.
   void gather(const std::vector<Seconds>& axes, std::vector<Column> columns);
   /// Stores "source:line: expected ..., found ..." as the last error; returns false.
@@ -40,11 +52,15 @@ class GatheredSeries : public StoredTimeSeries {
 
   std::string sourceName_;
   std::vector<std::string> doubts_;
+  bool endsLine_ = true;
 
  private:
+  bool readAll(std::string sourceName, FileParts& parts);
+  void forget();
   bool readItem(std::size_t place) final;
   std::vector<double> readExactItem(std::size_t place) final;
 
+  std::shared_ptr<SeriesReading> reading_;
   std::vector<int> wanted_;                        ///< items that are read; none: all
   std::vector<std::vector<double>> values_;        ///< of each item, at the times of its own axis
   std::vector<std::size_t> axisOf_;                ///< of each item

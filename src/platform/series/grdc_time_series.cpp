@@ -32,19 +32,7 @@ bool GrdcTimeSeries::fits(std::string_view head) {
   return false;
 }
 
-bool GrdcTimeSeries::open(const std::string& fileName) {
-  FileParts parts(fileName, reading_);
-  return read(fileName, parts);
-}
-
-bool GrdcTimeSeries::parse(std::string sourceName, std::string_view content) {
-  FileParts parts(content);
-  return read(std::move(sourceName), parts);
-}
-
-bool GrdcTimeSeries::read(std::string sourceName, FileParts& parts) {
-  forget();
-  sourceName_ = std::move(sourceName);
+bool GrdcTimeSeries::read(FileParts& parts) {
   std::string unit;
   std::optional<std::int32_t> promised;
   std::vector<Column> columns;

@@ -47,18 +47,7 @@ bool RdbTimeSeries::fits(std::string_view head) {
   return false;
 }
 
-bool RdbTimeSeries::open(const std::string& fileName) {
-  FileParts parts(fileName, reading_);
-  return read(fileName, parts);
-}
-
-bool RdbTimeSeries::parse(std::string sourceName, std::string_view content) {
-  FileParts parts(content);
-  return read(std::move(sourceName), parts);
-}
-
 void RdbTimeSeries::clear() {
-  forget();
   table_ = {};
   zone_ = {};
   firstZone_.clear();
@@ -68,9 +57,8 @@ void RdbTimeSeries::clear() {
   columns_.clear();
 }
 
-bool RdbTimeSeries::read(std::string sourceName, FileParts& parts) {
+bool RdbTimeSeries::read(FileParts& parts) {
   clear();
-  sourceName_ = std::move(sourceName);
   enum class Expected { names, formats, rows } expected = Expected::names;
   std::size_t number = 0;
   while (const auto next = parts.nextLine()) {

@@ -13,8 +13,6 @@
 
 namespace mirevo {
 
-struct SeriesReading;
-
 /// A tab-delimited RDB file of the USGS: `#` comments, a row of column names, a row of formats ("5s 15s 20d 14n 10s"),
 /// and a row per time; further tables may follow in the same way. Source: USGS, "Tab-delimited (RDB) format",
 /// waterdata.usgs.gov, tab_delimited_format_info.
@@ -24,11 +22,7 @@ struct SeriesReading;
 /// there are several sites, each has items of its own.
 class RdbTimeSeries final : public GatheredSeries {
  public:
-  explicit RdbTimeSeries(std::shared_ptr<SeriesReading> reading = nullptr) : reading_(std::move(reading)) {}
-
-  bool open(const std::string& fileName) override;
-  bool parse(std::string sourceName, std::string_view content);
-  bool endsLine() const override { return endsLine_; }
+  explicit RdbTimeSeries(std::shared_ptr<SeriesReading> reading = nullptr) : GatheredSeries(std::move(reading)) {}
 
   /// Whether a file that begins like this is one: its first two rows after the comments are names and formats.
   static bool fits(std::string_view head);
@@ -48,7 +42,7 @@ class RdbTimeSeries final : public GatheredSeries {
     std::map<std::string, std::size_t> columns;  ///< by name, the place among columns_
   };
 
-  bool read(std::string sourceName, FileParts& parts);
+  bool read(FileParts& parts) override;
   void clear();
   bool readNames(std::string_view line, std::size_t number);
   bool readFormats(std::string_view line, std::size_t number);
@@ -57,8 +51,6 @@ class RdbTimeSeries final : public GatheredSeries {
   std::string unitOf(std::string_view column) const;
   void finish();
 
-  std::shared_ptr<SeriesReading> reading_;
-  bool endsLine_ = true;
   Table table_;
   FileZone zone_;
   std::string firstZone_;

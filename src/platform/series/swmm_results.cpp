@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <cmath>
-#include <cstring>
 
 #include <fmt/core.h>
 
@@ -88,10 +87,7 @@ std::string_view textOf(Unit unit, int flowUnits) {
 }  // namespace
 
 bool SwmmResults::fits(std::string_view head) {
-  std::int32_t magic = 0;
-  if (head.size() < sizeof magic) return false;
-  std::memcpy(&magic, head.data(), sizeof magic);
-  return magic == kMagic;
+  return beginsWith(head, kMagic);
 }
 
 bool SwmmResults::readHeader() {

@@ -333,9 +333,7 @@ class XmlTimeSeries::Reader final {
   std::size_t faultLine_ = 0;
 };
 
-bool XmlTimeSeries::read(std::string sourceName, FileParts& parts) {
-  forget();
-  sourceName_ = std::move(sourceName);
+bool XmlTimeSeries::read(FileParts& parts) {
   Reader reader;
   XmlSplitter splitter([&](std::string_view root) { return reader.begin(root); },
                        [&](std::size_t container, const std::string& points, std::size_t line) {
@@ -364,16 +362,6 @@ bool XmlTimeSeries::read(std::string sourceName, FileParts& parts) {
   lastError_ = fmt::format("{}:{}: {}", sourceName_, reader.faultLine() == 0 ? splitter.line() : reader.faultLine(),
                            reader.fault().empty() ? splitter.fault() : reader.fault());
   return false;
-}
-
-bool XmlTimeSeries::parse(std::string sourceName, std::string_view content) {
-  FileParts parts(content);
-  return read(std::move(sourceName), parts);
-}
-
-bool XmlTimeSeries::open(const std::string& fileName) {
-  FileParts parts(fileName, reading_);
-  return read(fileName, parts);
 }
 
 }  // namespace mirevo

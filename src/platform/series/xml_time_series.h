@@ -10,8 +10,6 @@
 
 namespace mirevo {
 
-struct SeriesReading;
-
 /// Series in XML: WaterML 1.1 (CUAHSI's schema, and the services of the USGS), WaterML 2.0 time series (OGC 10-126r4:
 /// time-value pairs, "MeasurementTVP") and PI-XML (Deltares, "Delft-FEWS Published Interface: timeseries", schema
 /// pi_timeseries.xsd). The root element tells which. One item for each of their series, in file order, and after it its
@@ -19,16 +17,11 @@ struct SeriesReading;
 /// times and values are kept.
 class XmlTimeSeries final : public GatheredSeries {
  public:
-  explicit XmlTimeSeries(std::shared_ptr<SeriesReading> reading = nullptr) : reading_(std::move(reading)) {}
-
-  bool open(const std::string& fileName) override;
-  bool parse(std::string sourceName, std::string_view content);
+  explicit XmlTimeSeries(std::shared_ptr<SeriesReading> reading = nullptr) : GatheredSeries(std::move(reading)) {}
 
  private:
   class Reader;
-  bool read(std::string sourceName, FileParts& parts);
-
-  std::shared_ptr<SeriesReading> reading_;
+  bool read(FileParts& parts) override;
 };
 
 }  // namespace mirevo
