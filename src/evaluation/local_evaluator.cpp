@@ -75,7 +75,7 @@ void LocalEvaluator::startNext(int slot) {
 
 bool LocalEvaluator::isUsable(int slot) {
   std::vector<std::string> warnings;
-  const auto damage = runner_.renewIfDamaged(slot, warnings);
+  const auto damage = runner_.renewIfDamaged(slot, warnings, [this] { stopIfCancelled(); });
   for (const std::string& text : warnings) observer_.warning(text);
   if (!damage) return true;
   slots_[static_cast<std::size_t>(slot - 1)].isGivenUp = true;

@@ -231,7 +231,8 @@ std::optional<EvaluationFailure> ModelRunner::findUnrunnable(std::span<const dou
   return findUnwritable(std::get<std::span<const double>>(mapped));
 }
 
-std::optional<FolderDamage> ModelRunner::renewIfDamaged(int slot, std::vector<std::string>& warnings) {
+std::optional<FolderDamage> ModelRunner::renewIfDamaged(int slot, std::vector<std::string>& warnings,
+                                                        const std::function<void()>& look) {
   SlotFiles& files = slots_.at(static_cast<std::size_t>(slot - 1));
   if (!files.isUsed) return std::nullopt;
   const std::string folder = launcher_.getProcessFolder(slot);
@@ -243,7 +244,7 @@ std::optional<FolderDamage> ModelRunner::renewIfDamaged(int slot, std::vector<st
     return std::nullopt;
   }
   if (files.isRenewed) return damage;
-  if (!launcher_.renewFolder(slot)) {
+  if (!launcher_.renewFolder(slot, look)) {
     damage->why += fmt::format("; the process folder could not be made anew: {}", launcher_.lastError());
     damage->isFinal = true;
     return damage;

@@ -72,6 +72,19 @@ TEST_F(Mpi, AJobWritesTheResultsOfAPlainRun) {
   }
 }
 
+TEST_F(Mpi, WorkersThatTheSearchHasNoUseForAreNamed) {
+  folder_.writeSetup({.algorithm = 2, .maxEvaluations = 12});
+  folder_.editSetup("Algorithm_Type = 2", "Algorithm_Type = 'PDDS'");
+  folder_.editSetup("Candidates = 6", "Candidates = 2");
+  const auto warningsWith = [this](int processes) {
+    const ProgramResult job = runJob(processes, {folder_ / "basin.kdx"});
+    EXPECT_EQ(job.exitCode, 0) << job.error << log();
+    return occurrences(log(), "Only 2 workers can be used by the evaluations of this run");
+  };
+  EXPECT_EQ(warningsWith(3), 0);
+  EXPECT_EQ(warningsWith(4), 1);
+}
+
 // exp(ln(5)) is 4.999999999999999, and exp(ln(10)) is above 10.
 TEST_F(Mpi, ASampleFileOfALogarithmicParameterIsRunAsItIsWritten) {
   const std::vector<std::string> given{"5", "10", "1", "3", "7", "9.7", "2.2", "6", "8.3", "9"};

@@ -274,12 +274,13 @@ void PosixProcessLauncher::prepareEnvironment(bool useSingleThread) {
   environment_.insert(environment_.end(), 2, nullptr);
 }
 
-bool PosixProcessLauncher::renewFolder(int slotNumber) {
+bool PosixProcessLauncher::renewFolder(int slotNumber, const std::function<void()>& look) {
   const std::string& folder = slotAt(slotNumber).folder;
   try {
-    CopyProgress unseen;
-    makeProcessFolderAnew(listFolder(baseFolder_, processFolderPrefix_), folder, {ownFiles_, linksReadOnlyFiles_},
-                          unseen);
+    const std::function<void()> looking = everyTenthOfSecond(look ? look : [] {});
+    CopyProgress progress(nullptr, looking);
+    makeProcessFolderAnew(listFolder(baseFolder_, processFolderPrefix_, looking), folder,
+                          {ownFiles_, linksReadOnlyFiles_}, progress);
     makeFilesOwn(folder, baseFolder_, ownFiles_, processFolderPrefix_);
   } catch (const FatalError& error) {
     lastError_ = textOf(error);

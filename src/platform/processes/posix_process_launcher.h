@@ -35,7 +35,7 @@ class PosixProcessLauncher final : public ProcessLauncher {
 
   bool initialise(const LauncherSettings& settings) override;
   const std::string& lastError() const override { return lastError_; }
-  bool renewFolder(int slot) override;
+  bool renewFolder(int slot, const std::function<void()>& look) override;
   std::string getProcessFolder(int slot) const override;
   void createProcesses(int slot) override;
   void isExecuting(int slot, std::int32_t& executing, std::int32_t& status) override;

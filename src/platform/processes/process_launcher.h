@@ -70,8 +70,8 @@ class ProcessLauncher {
   virtual const std::string& lastError() const = 0;
 
   /// Makes the process folder of a slot that runs nothing once more such a copy, whatever has become of it. False when
-  /// that fails; lastError() says why.
-  virtual bool renewFolder(int slot) = 0;
+  /// that fails; lastError() says why. `look`, if any, is called ten times a second and may throw to end it.
+  virtual bool renewFolder(int slot, const std::function<void()>& look) = 0;
 
   /// Absolute path of the slot's folder, without a trailing separator.
   virtual std::string getProcessFolder(int slot) const = 0;

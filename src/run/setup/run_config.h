@@ -70,6 +70,8 @@ struct RunConfig {
   int plannedEvaluations() const;
   /// plannedEvaluations() and the final model run of a search, for the progress.
   int plannedModelRuns() const;
+  /// Most model runs at a time that the task has use for, at least 1.
+  int mostAtOnce() const;
   /// Whether the task's results depend on the random seed.
   bool drawsRandomNumbers() const { return task && task->drawsRandomNumbers(); }
   /// Whether the task uses simulated values at the observation times.

@@ -389,7 +389,7 @@ void SetupReader::readSimultaneousSimulations() {
     return;
   }
   // A slot has its own copy of the model; unused slots would only fill the disk.
-  const int mostUsed = std::max(1, config_.task ? config_.task->mostAtOnce() : 0);
+  const int mostUsed = config_.mostAtOnce();
   if (config_.simultaneousSimulations <= mostUsed) return;
   section.warn(kSlotsKeyword, fmt::format("only {} can be used by the evaluations of this run", mostUsed));
   config_.simultaneousSimulations = mostUsed;
