@@ -32,7 +32,6 @@
 #include "platform/processes/helper_process.h"
 #include "platform/processes/own_files.h"
 #include "platform/processes/process_folder.h"
-#include "platform/signals/signal_state.h"
 
 namespace mirevo {
 namespace {
@@ -58,10 +57,10 @@ constexpr double kUnwatchedSeconds = 0.02;
 /// would keep.
 constexpr double kRequestSeconds = 0.5;
 
-/// Whether the signal may have been meant for the whole job.
+/// Whether the signal may have been meant for the whole job: a request to end or, after that, a kill.
 bool mayEndJob(int signal) {
-  return signal == SIGKILL ||
-         std::find(kEndingRequests.begin(), kEndingRequests.end(), signal) != kEndingRequests.end();
+  constexpr std::array kSignals{SIGINT, SIGTERM, SIGHUP, SIGQUIT, SIGXCPU, SIGKILL};
+  return std::find(kSignals.begin(), kSignals.end(), signal) != kSignals.end();
 }
 
 std::string baseName(const std::string& path) {
