@@ -6,6 +6,7 @@
 
 #include <fmt/core.h>
 
+#include "common/clock.h"
 #include "common/fatal_error.h"
 
 namespace mirevo {
@@ -23,7 +24,7 @@ LocalEvaluator::LocalEvaluator(ModelRunner& runner, EvaluationObserver& observer
 std::vector<EvaluationResult> LocalEvaluator::evaluateParameterSets(std::span<const ParameterSet> sets,
                                                                     DispatchMode mode) {
   assert(!ledger_.isOpen());
-  ledger_.open(sets, mode);
+  ledger_.open(sets, mode, slots_.size());
   startInFreeSlots();
   while (!ledger_.isComplete()) goOn();
   return ledger_.end();
@@ -63,9 +64,9 @@ void LocalEvaluator::startNext(int slot) {
     stopIfCancelled();
     if (!isUsable(slot)) return ledger_.putBack(*place);
     runner_.setStandard(ledger_.standard());
-    auto failure = runner_.prepareModelRun(ledger_.set(*place), slot);
+    auto failure = runner_.prepareModelRun(ledger_.set(*place), slot, ledger_.numberOf(*place));
     if (!failure) {
-      ledger_.markInitiated(*place);
+      ledger_.markInitiated(*place, runTimeClock());
       slots_[static_cast<std::size_t>(slot - 1)].running = Running{*place, {}};
       return;
     }
@@ -96,7 +97,7 @@ bool LocalEvaluator::takeFinished() {
       std::int32_t status = 0;
       runner_.launcher().isExecuting(slot, executing, status);
       if (executing != 0) continue;
-      ledger_.markEnded();
+      ledger_.markEnded(place, runTimeClock());
       running->ended = runner_.collect(slot, [this] { stopIfCancelled(); });
       runner_.keepOutputFiles(slot, ledger_.numberOf(place), *running->ended, ledger_.repeatedMeasures(place));
     }

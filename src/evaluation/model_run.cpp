@@ -269,7 +269,7 @@ std::optional<FolderDamage> ModelRunner::removeResults(const SlotFiles& files) {
   return std::nullopt;
 }
 
-std::optional<EvaluationFailure> ModelRunner::prepareModelRun(std::span<const double> set, int slot) {
+std::optional<EvaluationFailure> ModelRunner::prepareModelRun(std::span<const double> set, int slot, int number) {
   const auto mapped = parameters_.MapToModelValues(set);
   if (const auto* failure = std::get_if<ParameterFailure>(&mapped)) return parameterFailure(*failure);
   const auto modelValues = std::get<std::span<const double>>(mapped);
@@ -287,7 +287,7 @@ std::optional<EvaluationFailure> ModelRunner::prepareModelRun(std::span<const do
     }
   }
   files.started = runTimeClock() - readingSeconds_;
-  shownRuns_.begin(slot, ToModelScale(parameters_.searchSpace(), set));
+  shownRuns_.begin(slot, number, ToModelScale(parameters_.searchSpace(), set));
   launcher_.createProcesses(slot);
   return std::nullopt;
 }

@@ -20,7 +20,7 @@ class ModelRunTest : public EvaluationTest {
 
   EvaluationResult evaluate(double a) {
     const std::vector<double> set = {a};
-    EXPECT_FALSE(runner_->prepareModelRun(set, 1).has_value());
+    EXPECT_FALSE(runner_->prepareModelRun(set, 1, ++number_).has_value());
     launcher_.now += batch_.seconds;
     std::int32_t executing = 1;
     std::int32_t status = 0;
@@ -36,6 +36,7 @@ class ModelRunTest : public EvaluationTest {
     return refusalOf([this] { makeRunner(launcher_, 1); });
   }
 
+  int number_ = 0;
   FakeLauncher::Batch batch_;
   FakeLauncher launcher_;
 };
@@ -299,7 +300,7 @@ TEST_F(ModelRunTest, CrossSectionFilesHaveTheirResistanceNumbersUpdated) {
   };
   for (const auto& [outcome, text] : texts) {
     launcher_.resistanceUpdate = outcome;
-    EXPECT_EQ(refusalMessageOf([this] { runner_->prepareModelRun(std::vector<double>{2.0}, 1); }),
+    EXPECT_EQ(refusalMessageOf([this] { runner_->prepareModelRun(std::vector<double>{2.0}, 1, 1); }),
               std::string("Error updating resistance numbers: ") + text);
   }
 }
