@@ -18,6 +18,7 @@
 #include "common/reading_watch.h"
 #include "common/text.h"
 #include "measures/dates.h"
+#include "measures/item_names.h"
 #include "measures/measure_file.h"
 #include "measures/statistics.h"
 #include "platform/processes/leaving_links.h"
@@ -307,6 +308,13 @@ std::optional<EvaluationFailure> OutputReader::readSeriesMeasure(const std::stri
   if (measure.simulation.itemNo > simulation.itemCount()) {
     return failureOf(Kind::resultsNotReadable, fmt::format("{}: expected item No. {}, found {} items", path,
                                                            measure.simulation.itemNo, simulation.itemCount()));
+  }
+  if (const std::string found = simulation.itemName(measure.simulation.itemNo);
+      !measure.simulation.itemName.empty() && !isItemCalled(found, measure.simulation.itemName)) {
+    return failureOf(
+        Kind::resultsNotReadable,
+        fmt::format("{}: expected item No. {} to be {}, as in the file of the model's folder, found {}", path,
+                    measure.simulation.itemNo, quotedForMessage(measure.simulation.itemName), quotedForMessage(found)));
   }
   try {
     // A model that stopped early is a failed evaluation; a setup whose period no model run can match ends the run.

@@ -10,6 +10,7 @@
 #include "measures/observation_selection.h"
 #include "measures/observation_weights.h"
 #include "measures/time_match.h"
+#include "platform/series/text_form.h"
 #include "platform/series/time_series_object.h"
 
 namespace mirevo {
@@ -41,11 +42,15 @@ std::optional<ValueTransformation> findTransformation(std::string_view name);
 struct SeriesReference {
   std::string fileName;  ///< absolute; trailing blanks trimmed
   std::int32_t itemNo = 1;
+  std::string itemName = {};  ///< as the setup has it; empty: the number tells the item
   /// What begins the detail of an error in the file name or in the item, "setup.kdx:75:23: File_Name: "; empty if it is
   /// not known.
   std::string fileLocation = {};
   std::string itemLocation = {};
-  bool isDefaultItem = false;  ///< the setup does not say which item
+  bool isDefaultItem = false;     ///< the setup does not say which item
+  bool hasItemNo = false;         ///< the setup has the number, which may be beside the name
+  TextForm form = {};             ///< of a text file
+  std::string formLocation = {};  ///< likewise, of the first keyword that tells the form
 };
 
 /// A comparison of a simulated with an observed series, reduced to one number, or a number that the model wrote.

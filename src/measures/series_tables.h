@@ -90,7 +90,8 @@ class SeriesTables final {
 
   std::vector<std::string> observationNames_;
   std::vector<std::string> simulationNames_;
-  std::vector<std::size_t> observationIndex_;  ///< one per measure, 0-based
+  std::vector<SeriesReference> simulationFiles_;  ///< one per name: that of the measure that names it first
+  std::vector<std::size_t> observationIndex_;     ///< one per measure, 0-based
   std::vector<std::size_t> simulationIndex_;
   std::vector<bool> needsPairs_;                   ///< one per measure
   std::vector<ComparedItems> comparedItems_;       ///< one per measure
@@ -102,10 +103,10 @@ class SeriesTables final {
   std::vector<std::string> warnings_;
 };
 
-/// Creates and opens one file, whose `items` will be read; `reading` may be null. Throws FatalError with "Error
-/// creating TS object for file: " or "Error opening TS object for file: " and the name; the detail holds the location,
-/// after `setupLocation`.
-std::unique_ptr<TimeSeriesObject> openTimeSeries(const std::string& fileName, const std::string& setupLocation = {},
+/// Creates and opens the file of the reference, of which `items` will be read; `reading` may be null. Throws FatalError
+/// with "Error creating TS object for file: " or "Error opening TS object for file: " and the name; the detail holds
+/// the location.
+std::unique_ptr<TimeSeriesObject> openTimeSeries(const SeriesReference& reference,
                                                  std::shared_ptr<SeriesReading> reading = nullptr,
                                                  std::span<const int> items = {});
 

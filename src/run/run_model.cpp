@@ -10,6 +10,7 @@
 
 #include "common/run_files.h"
 #include "common/text.h"
+#include "measures/item_names.h"
 
 namespace mirevo {
 ModelDescription describeModel(const RunConfig& config) {
@@ -17,7 +18,7 @@ ModelDescription describeModel(const RunConfig& config) {
   model.baseFolder = config.baseFolder;
   model.fileTag = config.setupName;
   model.parameterFiles = config.parameterFiles;
-  model.measures = config.measures;
+  model.measures = withItemNumbers(config.measures);
   if (config.readsMeasureFile()) model.measureFile = config.measureFile;
   model.instructions = config.instructions;
   model.period = config.period;

@@ -12,19 +12,31 @@
 
 #include "algorithms/searches/search_methods.h"
 #include "measures/statistics.h"
+#include "measures/text_form_keywords.h"
 #include "run/setup/validation.h"
 
 namespace mirevo {
 namespace {
 
+constexpr std::string_view kItemNameMeaning =
+    "Its name in the file, in upper or lower case, with or without a unit in brackets behind it, in place of the "
+    "number "
+    "or beside it: they must then agree.";
+
 /// The keywords of the series that `seriesOf(measure)` returns.
 template <class SeriesOf>
 std::vector<KeywordRow> seriesKeywords(SeriesOf, std::string_view fileMeaning) {
   using Measure = OutputMeasure;
-  return {setting<Measure>([](auto& m) -> auto& { return SeriesOf{}(m).fileName; },
-                           {.name = "File_Name", .type = KeywordType::fileName, .meaning = std::string(fileMeaning)}),
-          setting<Measure>([](auto& m) -> auto& { return SeriesOf{}(m).itemNo; },
-                           {.name = "Item_No", .defaultValue = "1", .meaning = "Which item of the file, from 1."})};
+  std::vector<KeywordRow> rows = {
+      setting<Measure>([](auto& m) -> auto& { return SeriesOf{}(m).fileName; },
+                       {.name = "File_Name", .type = KeywordType::fileName, .meaning = std::string(fileMeaning)}),
+      setting<Measure>([](auto& m) -> auto& { return SeriesOf{}(m).itemNo; },
+                       {.name = "Item_No", .defaultValue = "1", .meaning = "Which item of the file, from 1."}),
+      setting<Measure>([](auto& m) -> auto& { return SeriesOf{}(m).itemName; },
+                       {.name = "Item_Name", .defaultValue = kNoDefault, .meaning = std::string(kItemNameMeaning)})};
+  std::vector<KeywordRow> ofForm = textFormRows<Measure>([](auto& m) -> auto& { return SeriesOf{}(m).form; });
+  std::move(ofForm.begin(), ofForm.end(), std::back_inserter(rows));
+  return rows;
 }
 
 /// Which other item of the observation file is meant: `itemOf(weighting)`.
@@ -36,6 +48,15 @@ KeywordRow weightingItem(ItemOf, std::string_view keyword, std::string_view mean
                                  .range = from(1),
                                  .refusal = "Error: Item number invalid for output measure ",
                                  .meaning = std::string(meaning)});
+}
+
+/// The same by its name.
+template <class NameOf>
+KeywordRow weightingItemName(NameOf, std::string_view keyword, std::string_view number) {
+  return setting<OutputMeasure>([](auto& m) -> auto& { return NameOf{}(m.weighting); },
+                                {.name = keyword,
+                                 .defaultValue = kNoDefault,
+                                 .meaning = fmt::format("Its name, in place of `{}` or beside it.", number)});
 }
 
 /// The enumerator of a code that has a name only.
@@ -457,13 +478,19 @@ const SettingSection<OutputMeasure>& observationFileSection() {
         [](auto& w) -> auto& { return w.weightItem; }, "Weight_Item_No",
         "Item of the file with a weight for each observation, which multiplies its "
         "difference. One with the weight 0 or a missing one does not count."));
+    keywords.push_back(weightingItemName(
+        [](auto& w) -> auto& { return w.weightName; }, "Weight_Item_Name", "Weight_Item_No"));
     keywords.push_back(weightingItem(
         [](auto& w) -> auto& { return w.errorItem; }, "Error_Item_No",
         "Item with a standard error for each observation: its weight is 1 over that. Not "
         "with `Weight_Item_No`."));
+    keywords.push_back(weightingItemName(
+        [](auto& w) -> auto& { return w.errorName; }, "Error_Item_Name", "Error_Item_No"));
     keywords.push_back(weightingItem(
         [](auto& w) -> auto& { return w.qualityItem; }, "Quality_Item_No",
         "Item with a quality code, a number, for each observation; those without one count in full."));
+    keywords.push_back(weightingItemName(
+        [](auto& w) -> auto& { return w.qualityName; }, "Quality_Item_Name", "Quality_Item_No"));
     keywords.push_back(setting<Measure>([](auto& m) -> auto& { return m.weighting.leftOut; },
                                         {.name = "Quality_Left_Out",
                                          .defaultValue = kNoDefault,
@@ -491,7 +518,7 @@ const SettingSection<OutputMeasure>& observationFileSection() {
 }
 
 const SettingSection<SeriesReference>& shownAboveSection() {
-  static const SettingSection<SeriesReference> section{
+  static const SettingSection<SeriesReference> section{withRows(
       {"ObjectiveFunctions/OUTPUT_MEASURES/MEASURE_n/SHOWN_ABOVE",
        "for each measure that has it",
        "A series, such as precipitation, that the report draws above the hydrograph, from the top down. It is not "
@@ -504,7 +531,13 @@ const SettingSection<SeriesReference>& shownAboveSection() {
         setting<&SeriesReference::itemNo>({.name = "Item_No",
                                            .defaultValue = "1",
                                            .meaning = "Which item of the file, from 1.",
-                                           .bearsOnResults = kNotOfResults})}}};
+                                           .bearsOnResults = kNotOfResults}),
+        setting<&SeriesReference::itemName>({.name = "Item_Name",
+                                             .defaultValue = kNoDefault,
+                                             .meaning = std::string(kItemNameMeaning),
+                                             .bearsOnResults = kNotOfResults})}},
+      textFormRows<SeriesReference>(
+          [](auto& s) -> auto& { return s.form; }, kNotOfResults))};
   return section;
 }
 

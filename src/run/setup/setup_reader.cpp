@@ -12,6 +12,7 @@
 #include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/text.h"
+#include "measures/text_form_keywords.h"
 #include "parameters/read_template.h"
 #include "platform/processes/argument_text.h"
 #include "run/access/file_validation.h"
@@ -286,8 +287,19 @@ void SetupReader::readValidationPeriods(const SetupSection& parent) {
 /// location.
 void SetupReader::locateReference(const SetupSection& section, SeriesReference& reference) {
   reference.fileLocation = section.location("File_Name") + ": File_Name: ";
-  reference.itemLocation = section.location("Item_No") + ": Item_No: ";
-  reference.isDefaultItem = !section.isWritten("Item_No");
+  reference.itemName = trim(reference.itemName);
+  const std::string_view itemKeyword = reference.itemName.empty() ? "Item_No" : "Item_Name";
+  reference.itemLocation = fmt::format("{}: {}: ", section.location(itemKeyword), itemKeyword);
+  reference.hasItemNo = section.isWritten("Item_No");
+  reference.isDefaultItem = !reference.hasItemNo && reference.itemName.empty();
+  for (const KeywordRow& row : textFormRows<TextForm>([](auto& form) -> auto& { return form; })) {
+    if (!section.isWritten(row.name()) || reference.form.isGiven) continue;
+    reference.form.isGiven = true;
+    reference.formLocation = fmt::format("{}: {}: ", section.location(row.name()), row.name());
+  }
+  if (const auto fault = findFault(reference.form)) {
+    section.refuse("Error: Form of a text file invalid", fault->keyword, fault->explanation);
+  }
 }
 
 void SetupReader::readSeries(const SetupSection& section, OutputMeasure& measure) const {
@@ -311,12 +323,14 @@ void SetupReader::readSeries(const SetupSection& section, OutputMeasure& measure
   if (const auto observed = open("OBSERVATION_FILE")) {
     observed->read(observationFileSection(), measure);
     locateReference(*observed, measure.observation);
-    const auto locationOf = [&observed](std::string_view keyword) {
+    const auto locationOf = [&observed](std::string_view item, const std::string& name) {
+      const std::string keyword = fmt::format("{}{}", item, name.empty() ? "_No" : "_Name");
       return fmt::format("{}: {}: ", observed->location(keyword), keyword);
     };
-    measure.weighting.weightLocation =
-        locationOf(measure.weighting.errorItem != 0 ? "Error_Item_No" : "Weight_Item_No");
-    measure.weighting.qualityLocation = locationOf("Quality_Item_No");
+    const ObservationWeighting& weighting = measure.weighting;
+    measure.weighting.weightLocation = weighting.hasErrors() ? locationOf("Error_Item", weighting.errorName)
+                                                             : locationOf("Weight_Item", weighting.weightName);
+    measure.weighting.qualityLocation = locationOf("Quality_Item", weighting.qualityName);
     if (observed->isWritten("Quality_Weight") && measure.weighting.downWeighted.empty()) {
       observed->warn("Quality_Weight", "has no effect without Quality_Down_Weighted");
     }

@@ -97,6 +97,16 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
        "Weights of observations invalid for output measure Flow error", "found 2 in Quality_Left_Out, too"},
       {"'gauge.csv' => 'gauge.csv'\nQuality_Item_No = 9\nQuality_Down_Weighted = 2\nQuality_Weight = 1",
        "Weights of observations invalid for output measure Flow error", "found 1, with which the codes change nothing"},
+      {"'gauge.csv' => 'gauge.csv'\nWeight_Item_Name = 'w'\nError_Item_No = 3",
+       "Weights of observations invalid for output measure Flow error", "expected Weight_Item_Name or Error_Item_No"},
+      {"'gauge.csv' => 'gauge.csv'\nQuality_Item_Name = 'code'",
+       "Weights of observations invalid for output measure Flow error", "Quality_Item_Name: expected Quality_Left_Out"},
+      {"'gauge.csv' => 'gauge.csv'\nTime_Format = 'DD.MM.YY'", "Form of a text file invalid",
+       "Time_Format: expected YYYY, MM"},
+      {"'gauge.csv' => 'gauge.csv'\nHeader_Rows = -1", "Form of a text file invalid", "expected 0 to 100, found -1"},
+      {"'gauge.csv' => 'gauge.csv'\nTime_Unit = 'weeks'",
+       "Unable to read keyword in section OBSERVATION_FILE in KDX file",
+       "Time_Unit: expected one of the names 'seconds'"},
       {"Statistic_Type = 1 => 'KGE-NP' & 'gauge.csv' => 'gauge.csv'\nError_Item_No = 9",
        "Weights of observations invalid for output measure Flow error",
        "Error_Item_No: the statistic 'KGE-NP' has no weighted form"},
@@ -333,7 +343,9 @@ TEST_F(ValidationTest, CodesAreTakenByNumberOrByName) {
     for (const CodeName& code : row->facts.codes) {
       std::string shouted(code.name);
       for (char& c : shouted) c = static_cast<char>(std::toupper(static_cast<unsigned char>(c)));
-      const std::string byName = withValue(text, section->path, row->name(), "' " + shouted + " '");
+      const bool needsOrigin = row->name() == "Time_Unit";
+      const std::string byName = withValue(text, section->path, row->name(),
+                                           "' " + shouted + " '" + (needsOrigin ? "\nTime_Origin = 2001-01-01" : ""));
       if (!code.code) {
         EXPECT_EQ(failureOf(byName), "");
         continue;
