@@ -16,6 +16,7 @@
 #include "common/files.h"
 #include "common/text.h"
 #include "measures/dates.h"
+#include "measures/listing_series.h"
 #include "measures/measure_statistics.h"
 #include "measures/observed_series.h"
 #include "measures/shown_above.h"
@@ -33,6 +34,13 @@ std::size_t indexOf(std::vector<std::string>& table, std::string_view name) {
   if (found != table.end()) return static_cast<std::size_t>(found - table.begin());
   table.emplace_back(trimmed);
   return table.size() - 1;
+}
+
+std::unique_ptr<TimeSeriesObject> makeSeries(const std::string& path, std::string& reason,
+                                             std::shared_ptr<SeriesReading> reading,
+                                             const std::shared_ptr<const ListingForm>& listing) {
+  if (listing) return std::make_unique<ListingSeries>(listing, std::move(reading));
+  return createTimeSeriesObject(path, reason, std::move(reading));
 }
 
 /// Why the results of a model run in this file cannot be used; empty when they can.
@@ -57,10 +65,11 @@ constexpr std::string_view kTooMuchMemory = "reading it takes more memory than t
 /// Why the file of a model run cannot be opened, or its items in use not be read; empty, with `series`, when they can.
 std::optional<std::string> tryOpen(const std::string& path, std::uintmax_t usualSize, std::span<const int> items,
                                    const std::shared_ptr<SeriesReading>& reading,
+                                   const std::shared_ptr<const ListingForm>& listing,
                                    std::unique_ptr<TimeSeriesObject>& series) {
   std::string reason;
-  series = createTimeSeriesObject(path, reason, reading);
-  if (series && isTextSeries(path)) reason = faultOfSize(path, usualSize);
+  series = makeSeries(path, reason, reading, listing);
+  if (series && (listing || isTextSeries(path))) reason = faultOfSize(path, usualSize);
   if (!reason.empty()) return fmt::format("{}: {}", path, reason);
   try {
     series->willRead(items);
@@ -95,11 +104,12 @@ std::string spanText(const TimeSeriesObject& series) {
 }  // namespace
 
 std::unique_ptr<TimeSeriesObject> openTimeSeries(const std::string& fileName, const std::string& setupLocation,
-                                                 std::shared_ptr<SeriesReading> reading, std::span<const int> items) {
+                                                 std::shared_ptr<SeriesReading> reading, std::span<const int> items,
+                                                 const std::shared_ptr<const ListingForm>& listing) {
   const std::string name(trimTrailing(fileName));
   const std::string message = "Error opening TS object for file: " + name;
   std::string reason;
-  std::unique_ptr<TimeSeriesObject> series = createTimeSeriesObject(name, reason, std::move(reading));
+  std::unique_ptr<TimeSeriesObject> series = makeSeries(name, reason, std::move(reading), listing);
   if (!series) fatalError("Error creating TS object for file: " + name, setupLocation + reason);
   try {
     series->willRead(items);
@@ -133,7 +143,7 @@ SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> mea
     std::vector<int>& items = observationItems[tables.observationIndex_.back()];
     items.push_back(measure.observation.itemNo);
     for (const int item : measure.weighting.items()) items.push_back(item);
-    tables.simulationIndex_.push_back(indexOf(tables.simulationNames_, measure.simulation.fileName));
+    tables.simulationIndex_.push_back(tables.indexOfSimulation(measure.simulation));
     if (tables.simulationNames_.size() > simulationLocations.size()) {
       simulationLocations.push_back(measure.simulation.fileLocation);
     }
@@ -147,8 +157,9 @@ SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> mea
       items.erase(std::unique(items.begin(), items.end()), items.end());
     }
   }
-  const auto open = [&tables](const std::string& name, const std::string& location, std::span<const int> items) {
-    auto series = openTimeSeries(name, location, tables.reading_, items);
+  const auto open = [&tables](const std::string& name, const std::string& location, std::span<const int> items,
+                              const std::shared_ptr<const ListingForm>& listing = nullptr) {
+    auto series = openTimeSeries(name, location, tables.reading_, items, listing);
     for (const std::string& doubt : series->doubts()) tables.warnings_.push_back(location + doubt);
     return series;
   };
@@ -156,8 +167,10 @@ SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> mea
     tables.observations_.push_back(open(tables.observationNames_[i], observationLocations[i], observationItems[i]));
   }
   for (std::size_t i = 0; i < simulationLocations.size(); ++i) {
-    tables.simulations_.push_back(open(tables.simulationNames_[i], simulationLocations[i], tables.simulationItems_[i]));
+    tables.simulations_.push_back(open(tables.simulationNames_[i], simulationLocations[i], tables.simulationItems_[i],
+                                       tables.simulationForms_[i]));
     tables.usualSizes_.push_back(sizeOf(tables.simulationNames_[i]));
+    tables.toldDoubts_.push_back(tables.simulations_.back()->doubts().size());
   }
   tables.checkItems(measures, period, isForRuns);
   for (const OutputMeasure& measure : measures) {
@@ -167,6 +180,16 @@ SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> mea
   }
   tables.releaseSimulationFiles();
   return tables;
+}
+
+std::size_t SeriesTables::indexOfSimulation(const SeriesReference& simulation) {
+  const std::string_view name = trimTrailing(simulation.fileName);
+  for (std::size_t i = 0; i < simulationNames_.size(); ++i) {
+    if (simulationNames_[i] == name && simulationForms_[i] == simulation.listing) return i;
+  }
+  simulationNames_.emplace_back(name);
+  simulationForms_.push_back(simulation.listing);
+  return simulationNames_.size() - 1;
 }
 
 void SeriesTables::checkItems(std::span<const OutputMeasure> measures, const EvaluationPeriod& period, bool isForRuns) {
@@ -337,10 +360,15 @@ std::optional<std::string> SeriesTables::tryOpenSimulationFiles(std::span<const 
   releaseSimulationFiles();
   for (std::size_t i = 0; i < paths.size(); ++i) {
     std::unique_ptr<TimeSeriesObject> series;
-    if (auto unusable =
-            tryOpen(std::string(trimTrailing(paths[i])), usualSizes_[i], simulationItems_[i], reading_, series)) {
+    if (auto unusable = tryOpen(std::string(trimTrailing(paths[i])), usualSizes_[i], simulationItems_[i], reading_,
+                                simulationForms_[i], series)) {
       releaseSimulationFiles();
       return unusable;
+    }
+    // Whether columns cut a number depends on how long it is.
+    if (simulationForms_[i]) {
+      const std::vector<std::string> doubts = series->doubts();
+      for (; toldDoubts_[i] < doubts.size(); ++toldDoubts_[i]) newDoubts_.push_back(doubts[toldDoubts_[i]]);
     }
     simulations_.push_back(std::move(series));
   }

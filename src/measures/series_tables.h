@@ -5,6 +5,7 @@
 #include <optional>
 #include <span>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "measures/output_measure.h"
@@ -43,10 +44,13 @@ class SeriesTables final {
   /// the run.
   std::optional<std::string> tryOpenSimulationFiles(std::span<const std::string> paths);
   void releaseSimulationFiles();
+  /// What is doubtful in listings that were opened for evaluations, and was not in one before; told once.
+  std::vector<std::string> takeDoubts() { return std::exchange(newDoubts_, {}); }
   /// Limits how long files are read.
   ReadingWatch& watch();
 
   const std::vector<std::string>& observationFileNames() const { return observationNames_; }
+  /// A listing that several measures read in different ways is there several times.
   const std::vector<std::string>& simulationFileNames() const { return simulationNames_; }
 
   /// The file of the measure with this 0-based index; simulation() may be called only between open and release.
@@ -65,6 +69,8 @@ class SeriesTables final {
  private:
   static constexpr std::size_t kNoSeries = static_cast<std::size_t>(-1);  ///< index of a measure of interface type 1
 
+  /// Index among simulationFileNames(), to which a new one is added.
+  std::size_t indexOfSimulation(const SeriesReference& simulation);
   /// Throws FatalError, as the first model run would, if there are none.
   void requireObservations(const ObservedSeries& observed, const OutputMeasure& measure,
                            const EvaluationPeriod& period);
@@ -90,12 +96,15 @@ class SeriesTables final {
 
   std::vector<std::string> observationNames_;
   std::vector<std::string> simulationNames_;
-  std::vector<std::size_t> observationIndex_;  ///< one per measure, 0-based
+  std::vector<std::shared_ptr<const ListingForm>> simulationForms_;  ///< one per simulation file; null: a series file
+  std::vector<std::size_t> observationIndex_;                        ///< one per measure, 0-based
   std::vector<std::size_t> simulationIndex_;
   std::vector<bool> needsPairs_;                   ///< one per measure
   std::vector<ComparedItems> comparedItems_;       ///< one per measure
   std::vector<std::vector<int>> simulationItems_;  ///< one per simulation file: the item numbers in use
-  std::vector<std::uintmax_t> usualSizes_;         ///< one per simulation file: as it was found at the start
+  std::vector<std::size_t> toldDoubts_;            ///< one per simulation file: how many were told
+  std::vector<std::string> newDoubts_;
+  std::vector<std::uintmax_t> usualSizes_;  ///< one per simulation file: as it was found at the start
   std::shared_ptr<SeriesReading> reading_;
   std::vector<std::unique_ptr<TimeSeriesObject>> observations_;
   std::vector<std::unique_ptr<TimeSeriesObject>> simulations_;
@@ -104,9 +113,10 @@ class SeriesTables final {
 
 /// Creates and opens one file, whose `items` will be read; `reading` may be null. Throws FatalError with "Error
 /// creating TS object for file: " or "Error opening TS object for file: " and the name; the detail holds the location,
-/// after `setupLocation`.
+/// after `setupLocation`. With a `listing` the file is one.
 std::unique_ptr<TimeSeriesObject> openTimeSeries(const std::string& fileName, const std::string& setupLocation = {},
                                                  std::shared_ptr<SeriesReading> reading = nullptr,
-                                                 std::span<const int> items = {});
+                                                 std::span<const int> items = {},
+                                                 const std::shared_ptr<const ListingForm>& listing = nullptr);
 
 }  // namespace mirevo

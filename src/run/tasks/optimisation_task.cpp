@@ -247,8 +247,11 @@ void OptimisationTask::takeGivenValues(const TaskReading& reading, const SetupSe
                                        : "a search proposes nothing else among equal points";
   section.warn(kInitialSampleFileKeyword, distinct == 1
                                               ? fmt::format("its {} sets are the same: {}", sample.sets.size(), meaning)
-                                              : fmt::format("{} of its {} sets are repetitions of others",
-                                                            sample.sets.size() - distinct, sample.sets.size()));
+                                              : fmt::format("{} of its {} sets {}", sample.sets.size() - distinct,
+                                                            sample.sets.size(),
+                                                            sample.sets.size() - distinct == 1
+                                                                ? "is a repetition of another"
+                                                                : "are repetitions of others"));
 }
 
 std::vector<double> OptimisationTask::givenValues(std::size_t parameter) const {
@@ -303,7 +306,14 @@ void OptimisationTask::readStopping(const SetupSection& section, std::size_t var
 
 void OptimisationTask::readSurrogate(const TaskReading& reading, const SetupSection& section,
                                      const SetupSection& stoppingSection) {
-  const SetupSection control = section.open(nameInside(surrogateSection().row));
+  const std::string_view name = nameInside(surrogateSection().row);
+  if (!usesSurrogate() && !section.has(name)) {
+    section.refuse(fmt::format("Error: Unable to open section {} in KDX file", name), kSurrogateKeyword,
+                   fmt::format("{} uses no surrogate model: expected 0. With 1 the section is needed, though it has no "
+                               "effect",
+                               method->facts().longName));
+  }
+  const SetupSection control = section.open(name);
   SurrogateSection filled{surrogate, reading.variableCount};
   control.read(surrogateSection(), filled);
   if (!usesSurrogate()) {

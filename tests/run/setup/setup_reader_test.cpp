@@ -290,6 +290,12 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatAreSeldomMeant)
        "Transformation_Type: has no effect on a dependent parameter"},
       {"TqSEKdxListItemCount = 2 => 1",
        "setup.kdx:85:21: File_Name: has no effect, as no output measure has Interface_Type = 1"},
+      {"'model/measures.txt' => 'model/measures.txt'\nInstruction_File = 'none.ins' & Interface_Type = 1 => 0 & "
+       "Function_Name = '' => [SIMULATION_FILE]\nFile_Name = 'model/flow.csv'\n[/SIMULATION_FILE]\n"
+       "[OBSERVATION_FILE]\nFile_Name = 'gauge.csv'\n[/OBSERVATION_FILE]",
+       "Instruction_File: not read, as no output measure has Interface_Type = 1"},
+      {"'model/flow.csv' => 'model/flow.csv'\nInstruction_Step = 24.0",
+       "setup.kdx:72:20: Instruction_Step: has no effect without Instruction_File"},
       {"Aggregation_Method = 0 => 3 & Option = 2 => 0 & NoSimultaneousSim = 4 => 1", ""},
       {"Statistic_Type = 1 => 0 & Function_Type = 2 => 0",
        "setup.kdx:92:25: Function_Type: a sum with a difference that may be negative (\"Flow error\") is the smaller "
