@@ -77,5 +77,49 @@ TEST_F(InputOfOthers, ASeriesFromAListingGivesWhatItGivesFromACsv) {
                                  HasSubstr("out.lst:2:12: expected a number, found \"x\" (the number \"v1\" at ")));
 }
 
+TEST_F(InputOfOthers, EverySearchStartsFromSetsOfAnEarlierRunAndGoesOnFromThem) {
+  folder_.writeSetup({.maxEvaluations = 30});
+  expectRun();
+  const auto earlier = rows();
+  folder_.write("earlier.dat", folder_.read("basin_Optimisation.dat"));
+  folder_.write("earlier_Restart.dat", folder_.read("basin_Optimisation_Restart.dat"));
+  std::vector<std::vector<std::string>> best(earlier.begin(), earlier.end() - 1);  // without the final run
+  std::ranges::stable_sort(best, {}, [](const auto& row) { return std::stod(row.back()); });
+
+  const std::tuple<const char*, int, std::size_t> searches[] = {
+      {"SCE", 1, 5}, {"PSE", 3, 5}, {"OPSE", 3, 5}, {"DDS", 1, 2}, {"PDDS", 3, 2}};
+  for (const auto& [search, slots, startCount] : searches) {
+    folder_.writeSetup({.search = search, .maxEvaluations = 40, .slots = slots});
+    const bool hasPopulation = startCount == 5;
+    folder_.editSetup("Initial_Sample_File_Name = ''",
+                      hasPopulation ? "Earlier_Result_File = 'earlier.dat'\nEarlier_Result_Sets = 4"
+                                    : "Earlier_Result_File = 'earlier.dat'");
+    expectRun();
+    const std::string expected = withoutDates(folder_.read("basin_Optimisation.dat"));
+    const auto found = rows();
+    ASSERT_GE(found.size(), 40U) << search;
+    EXPECT_EQ(found[0], earlier[0]) << search << ": the initial set";
+    for (std::size_t i = 1, k = 0; i < startCount; ++i, ++k) {
+      while (best[k][2] == earlier[0][2] && best[k][3] == earlier[0][3]) ++k;
+      EXPECT_EQ(std::vector(found[i].begin() + 2, found[i].end()), std::vector(best[k].begin() + 2, best[k].end()))
+          << search << i;
+    }
+    EXPECT_THAT(log(),
+                HasSubstr(fmt::format("\nInitial sample: {} of {}, the best of {} successful evaluations, run "
+                                      "anew\n",
+                                      hasPopulation ? "4 sets" : "1 set", folder_ / "earlier.dat", earlier.size())));
+    folder_.editSetup("Restart = 0", "Restart = 1");
+    folder_.write("basin_Optimisation.dat", expected.substr(0, expected.find("\n17\t") + 5));
+    expectRun();
+    EXPECT_EQ(withoutDates(folder_.read("basin_Optimisation.dat")), expected) << search;
+  }
+  folder_.editSetup("Max_No_Evaluations = 40", "Max_No_Evaluations = 55");
+  expectRun();
+  EXPECT_THAT(log(), HasSubstr("a new search starts from the best of the first 40 evaluations"));
+  folder_.write("earlier.dat", folder_.read("earlier.dat") + "# read\n");
+  EXPECT_EQ(run().exitCode, 1);
+  EXPECT_THAT(log(), HasSubstr("the content of earlier.dat has changed"));
+}
+
 }  // namespace
 }  // namespace mirevo::testing

@@ -24,6 +24,12 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
   folder_.write("no.ins", "pif ~\nl1 !head_1!\nx !head_2!\n");
   const std::string instructed = "'model/measures.txt' => 'model/measures.txt'\nInstruction_File = 'two.ins'";
   const std::string listed = "'model/flow.csv' => 'model/flow.csv'\nInstruction_File = ";
+  const std::string earlier =
+      "'sample.txt' => '' & Initial_Sample_Generation = 4 => Initial_Sample_Generation = 1\n"
+      "Earlier_Result_File = ";
+  folder_.write("earlier.dat", "Evaluation\tStatus\tDepth\tRate\tAggregate\n1\tOK\t99\t0.5\t1\n");
+  folder_.write("other.dat", "Evaluation\tStatus\tDepth\tRise\tAggregate\n1\tOK\t99\t0.5\t1\n");
+  folder_.write("setup_Optimisation.dat", "Evaluation\tStatus\tDepth\tRate\tAggregate\n1\tOK\t200\t0.5\t1\n");
   // The first line behind "Error: ", whole, and what the lines below it hold.
   const std::tuple<std::string, std::string, const char*> cases[] = {
       // The model and its files
@@ -196,6 +202,17 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
       {"Algorithm_Type = 1 => 2 & NoSimultaneousSim = 4 => 1 & Max_No_Evaluations = 500 => 0",
        "Maximum No. of model evaluations in DDS algorithm invalid", ""},
       {"'sample.txt' => '/dev/zero'", "Unable to open /dev/zero", "Not a regular file"},
+      {earlier + "'none.dat'", "Unable to open none.dat", "Earlier_Result_File: "},
+      {earlier + "'setup_Optimisation.dat'", "Earlier result file invalid",
+       "expected another file than the one that this run writes: copy it"},
+      {earlier + "'other.dat'", "Earlier result file invalid",
+       "other.dat:1: expected the variable parameters of this setup, found no \"Rate\" and in their place \"Rise\""},
+      {earlier + "'earlier.dat'", "Earlier result file invalid",
+       "earlier.dat: no set lies within the bounds; the first: earlier.dat:2: Depth = 99"},
+      {earlier + "'setup_Optimisation.dat'\nEarlier_Result_Sets = 0", "No. of sets of the earlier result file invalid",
+       "expected 1 or more, found 0"},
+      {"Initial_Sample_Generation = 4 => Initial_Sample_Generation = 4\nEarlier_Result_File = 'other.dat'",
+       "Earlier result file invalid", "expected this or Initial_Sample_Generation = 4, found both"},
       {"Algorithm_Type = 1 => 'PDDS' & [SURROGATE_MODEL_PARAMETERS] => [X] & [/SURROGATE_MODEL_PARAMETERS] => [/X]",
        "Unable to open section SURROGATE_MODEL_PARAMETERS in KDX file",
        "Use_Surrogate_Model: Parallel Dynamically Dimensioned Search uses no surrogate model: expected 0"},
