@@ -80,6 +80,7 @@ OutputReader::OutputReader(const ModelDescription& description, const ObjectiveA
   if (std::error_code none; !description.measureFile.empty()) {
     const std::uintmax_t size = std::filesystem::file_size(trimTrailing(description.measureFile), none);
     if (!none) usualNumbers_ = size;
+    if (!none && description.instructions) tryInstructions();
   }
   for (std::size_t i = 0; i < description.measures.size() && description.keepSimulatedValues; ++i) {
     const OutputMeasure& measure = description.measures[i];
@@ -91,6 +92,23 @@ OutputReader::OutputReader(const ModelDescription& description, const ObjectiveA
     addSimulatedSteps(*description.keptSteps, description.measures, description.period, observedSeries_);
   }
   prepareValidation();
+}
+
+/// A listing that is in the model's folder tells of wrong instructions before all model runs fail with them. It may be
+/// one of another version of the model, and a run writes its own.
+void OutputReader::tryInstructions() {
+  const std::string name(trimTrailing(description_.measureFile));
+  std::string reason;
+  std::vector<std::string> doubts;
+  if (readMeasureFile(name, numbersNeeded_, reason, series_.watch(), description_.instructions.get(), &doubts)) {
+    warnings_.insert(warnings_.end(), doubts.begin(), doubts.end());
+    hasToldDoubts_ = !doubts.empty();
+    return;
+  }
+  warnings_.push_back(fmt::format(
+      "{}\nThis listing, as it is in the model's folder now, is not as the instruction file says. A model run that "
+      "writes such a one has failed",
+      reason));
 }
 
 void OutputReader::prepareValidation() {
@@ -256,8 +274,10 @@ std::optional<EvaluationFailure> OutputReader::readMeasures(const OutputFiles& f
     if (const std::string tooLarge = faultOfSize(files.measureFile, usualNumbers_); !tooLarge.empty()) {
       reason = fmt::format("{}: {}", files.measureFile, tooLarge);
     } else {
-      file =
-          readMeasureFile(files.measureFile, numbersNeeded_, reason, series_.watch(), description_.instructions.get());
+      std::vector<std::string> doubts;
+      file = readMeasureFile(files.measureFile, numbersNeeded_, reason, series_.watch(),
+                             description_.instructions.get(), &doubts);
+      if (file && !doubts.empty() && !std::exchange(hasToldDoubts_, true)) result.warnings = std::move(doubts);
     }
     if (!file) return failureOf(Kind::resultsNotReadable, std::move(reason));
     written = std::move(*file);
@@ -265,6 +285,7 @@ std::optional<EvaluationFailure> OutputReader::readMeasures(const OutputFiles& f
   if (auto unusable = series_.tryOpenSimulationFiles(files.simulationFiles)) {
     return failureOf(Kind::resultsNotReadable, std::move(*unusable));
   }
+  for (std::string& doubt : series_.takeDoubts()) result.warnings.push_back(std::move(doubt));
   std::optional<EvaluationFailure> failure;
   std::vector<std::optional<FileForm>> forms(files.simulationFiles.size());
   bool hasForm = false;  // of the output-measure file

@@ -77,6 +77,7 @@ class OutputReader final {
     OutputMeasure measure;
     EvaluationPeriod period;
   };
+  void tryInstructions();
   void prepareValidation();
   /// Fills in the measures in the validation periods.
   void validate(EvaluationResult& result);
@@ -99,6 +100,7 @@ class OutputReader final {
   std::vector<std::string> warnings_;
   std::size_t numbersNeeded_ = 0;    ///< in the output-measure file
   std::uintmax_t usualNumbers_ = 0;  ///< size of that file as it was found at the start
+  bool hasToldDoubts_ = false;       ///< what the instructions read of a listing and may not mean
   std::vector<ObservedSeries> observedSeries_;
   RunStandard standard_;
 };

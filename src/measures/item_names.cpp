@@ -49,13 +49,13 @@ constexpr std::array kWaysToMean = {isEqual, isEqualIgnoringCase, isEqualWithout
 class NamedFiles final {
  public:
   const TimeSeriesObject& open(const SeriesReference& reference) {
-    auto& file = files_[{std::string(trimTrailing(reference.fileName)), reference.form}];
+    auto& file = files_[{std::string(trimTrailing(reference.fileName)), reference.form, reference.listing.get()}];
     if (!file) file = openTimeSeries(reference);
     return *file;
   }
 
  private:
-  std::map<std::pair<std::string, TextForm>, std::unique_ptr<TimeSeriesObject>> files_;
+  std::map<std::tuple<std::string, TextForm, const void*>, std::unique_ptr<TimeSeriesObject>> files_;
 };
 
 void findWeighting(OutputMeasure& measure, NamedFiles& files) {

@@ -1,12 +1,14 @@
 #pragma once
 
 #include <cstdint>
+#include <memory>
 #include <optional>
 #include <string>
 #include <string_view>
 
 #include "common/date_record.h"
 #include "common/settings/code_name.h"
+#include "measures/listing_settings.h"
 #include "measures/observation_selection.h"
 #include "measures/observation_weights.h"
 #include "measures/time_match.h"
@@ -38,6 +40,8 @@ inline constexpr CodeName kValueTransformationNames[] = {{std::nullopt, "none"},
 /// The transformation with this name, in any letter case.
 std::optional<ValueTransformation> findTransformation(std::string_view name);
 
+class ListingForm;
+
 /// One item of a time-series file.
 struct SeriesReference {
   std::string fileName;  ///< absolute; trailing blanks trimmed
@@ -51,6 +55,9 @@ struct SeriesReference {
   bool hasItemNo = false;         ///< the setup has the number, which may be beside the name
   TextForm form = {};             ///< of a text file
   std::string formLocation = {};  ///< likewise, of the first keyword that tells the form
+  ListingSettings listingSettings = {};
+  /// What of the file, which is then a listing, are series; the same object for equal settings. Null: a series file.
+  std::shared_ptr<const ListingForm> listing = {};
 };
 
 /// A comparison of a simulated with an observed series, reduced to one number, or a number that the model wrote.

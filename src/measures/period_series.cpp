@@ -94,7 +94,7 @@ std::vector<float> valuesAt(const PeriodSeries& series, std::span<const std::int
 bool isSameItems(const OutputMeasure& a, const OutputMeasure& b) {
   const auto isSame = [](const SeriesReference& left, const SeriesReference& right) {
     return left.fileName == right.fileName && left.form == right.form && left.itemNo == right.itemNo &&
-           left.itemName == right.itemName;
+           left.itemName == right.itemName && left.listing == right.listing;
   };
   return isSame(a.simulation, b.simulation) && isSame(a.observation, b.observation);
 }

@@ -16,6 +16,7 @@
 #include "common/files.h"
 #include "common/text.h"
 #include "measures/dates.h"
+#include "measures/listing_series.h"
 #include "measures/measure_statistics.h"
 #include "measures/observed_series.h"
 #include "measures/shown_above.h"
@@ -30,7 +31,7 @@ namespace {
 std::size_t indexOf(std::vector<SeriesReference>& table, const SeriesReference& reference) {
   const std::string_view name = trimTrailing(reference.fileName);
   const auto found = std::find_if(table.begin(), table.end(), [&](const SeriesReference& other) {
-    return other.fileName == name && other.form == reference.form;
+    return other.fileName == name && other.form == reference.form && other.listing == reference.listing;
   });
   if (found != table.end()) return static_cast<std::size_t>(found - table.begin());
   table.push_back(reference);
@@ -42,6 +43,12 @@ std::vector<std::string> namesOf(const std::vector<SeriesReference>& files) {
   std::vector<std::string> names;
   for (const SeriesReference& file : files) names.push_back(file.fileName);
   return names;
+}
+
+std::unique_ptr<TimeSeriesObject> makeSeries(const std::string& path, std::string& reason,
+                                             std::shared_ptr<SeriesReading> reading, const SeriesReference& reference) {
+  if (reference.listing) return std::make_unique<ListingSeries>(reference.listing, std::move(reading));
+  return createTimeSeriesObject(path, reason, std::move(reading), reference.form);
 }
 
 /// Why the results of a model run in this file cannot be used; empty when they can.
@@ -64,12 +71,12 @@ std::optional<std::string> findUnusable(TimeSeriesObject& series, const std::str
 constexpr std::string_view kTooMuchMemory = "reading it takes more memory than there is";
 
 /// Why the file of a model run cannot be opened, or its items in use not be read; empty, with `series`, when they can.
-std::optional<std::string> tryOpen(const std::string& path, const TextForm& form, std::uintmax_t usualSize,
+std::optional<std::string> tryOpen(const std::string& path, const SeriesReference& file, std::uintmax_t usualSize,
                                    std::span<const int> items, const std::shared_ptr<SeriesReading>& reading,
                                    std::unique_ptr<TimeSeriesObject>& series) {
   std::string reason;
-  series = createTimeSeriesObject(path, reason, reading, form);
-  if (series && isTextSeries(path, form)) reason = faultOfSize(path, usualSize);
+  series = makeSeries(path, reason, reading, file);
+  if (series && (file.listing || isTextSeries(path, file.form))) reason = faultOfSize(path, usualSize);
   if (!reason.empty()) return fmt::format("{}: {}", path, reason);
   try {
     series->willRead(items);
@@ -108,7 +115,7 @@ std::unique_ptr<TimeSeriesObject> openTimeSeries(const SeriesReference& referenc
   const std::string name(trimTrailing(reference.fileName));
   const std::string message = "Error opening TS object for file: " + name;
   std::string reason;
-  std::unique_ptr<TimeSeriesObject> series = createTimeSeriesObject(name, reason, std::move(reading), reference.form);
+  std::unique_ptr<TimeSeriesObject> series = makeSeries(name, reason, std::move(reading), reference);
   if (!series) {
     fatalError("Error creating TS object for file: " + name,
                (reference.form.isGiven ? reference.formLocation : reference.fileLocation) + reason);
@@ -165,6 +172,7 @@ SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> mea
   for (std::size_t i = 0; i < tables.simulationFiles_.size(); ++i) {
     tables.simulations_.push_back(open(tables.simulationFiles_[i], tables.simulationItems_[i]));
     tables.usualSizes_.push_back(sizeOf(tables.simulationNames_[i]));
+    tables.toldDoubts_.push_back(tables.simulations_.back()->doubts().size());
   }
   tables.checkItems(measures, period, isForRuns);
   for (const OutputMeasure& measure : measures) {
@@ -344,10 +352,15 @@ std::optional<std::string> SeriesTables::tryOpenSimulationFiles(std::span<const 
   releaseSimulationFiles();
   for (std::size_t i = 0; i < paths.size(); ++i) {
     std::unique_ptr<TimeSeriesObject> series;
-    if (auto unusable = tryOpen(std::string(trimTrailing(paths[i])), simulationFiles_[i].form, usualSizes_[i],
+    if (auto unusable = tryOpen(std::string(trimTrailing(paths[i])), simulationFiles_[i], usualSizes_[i],
                                 simulationItems_[i], reading_, series)) {
       releaseSimulationFiles();
       return unusable;
+    }
+    // Whether columns cut a number depends on how long it is.
+    if (simulationFiles_[i].listing) {
+      const std::vector<std::string> doubts = series->doubts();
+      for (; toldDoubts_[i] < doubts.size(); ++toldDoubts_[i]) newDoubts_.push_back(doubts[toldDoubts_[i]]);
     }
     simulations_.push_back(std::move(series));
   }

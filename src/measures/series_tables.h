@@ -5,6 +5,7 @@
 #include <optional>
 #include <span>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "measures/output_measure.h"
@@ -43,10 +44,13 @@ class SeriesTables final {
   /// the run.
   std::optional<std::string> tryOpenSimulationFiles(std::span<const std::string> paths);
   void releaseSimulationFiles();
+  /// What is doubtful in listings that were opened for evaluations, and was not in one before; told once.
+  std::vector<std::string> takeDoubts() { return std::exchange(newDoubts_, {}); }
   /// Limits how long files are read.
   ReadingWatch& watch();
 
   const std::vector<std::string>& observationFileNames() const { return observationNames_; }
+  /// A listing that several measures read in different ways is there several times.
   const std::vector<std::string>& simulationFileNames() const { return simulationNames_; }
 
   /// The file of the measure with this 0-based index; simulation() may be called only between open and release.
@@ -96,7 +100,9 @@ class SeriesTables final {
   std::vector<bool> needsPairs_;                   ///< one per measure
   std::vector<ComparedItems> comparedItems_;       ///< one per measure
   std::vector<std::vector<int>> simulationItems_;  ///< one per simulation file: the item numbers in use
-  std::vector<std::uintmax_t> usualSizes_;         ///< one per simulation file: as it was found at the start
+  std::vector<std::size_t> toldDoubts_;            ///< one per simulation file: how many were told
+  std::vector<std::string> newDoubts_;
+  std::vector<std::uintmax_t> usualSizes_;  ///< one per simulation file: as it was found at the start
   std::shared_ptr<SeriesReading> reading_;
   std::vector<std::unique_ptr<TimeSeriesObject>> observations_;
   std::vector<std::unique_ptr<TimeSeriesObject>> simulations_;

@@ -447,12 +447,14 @@ void RunDriver::finish(const TaskOutcome& outcome) {
                              : fmt::format("{} model evaluations, {} of them failed", count, reporter_->failedCount()));
   if (reporter_->repeatCount() > 0) {
     state_.log.line(
-        fmt::format("{} of them have the result of an earlier evaluation of the same set, without a model "
+        fmt::format("{} of them {} the result of an earlier evaluation of the same set, without a model "
                     "run (column Repeats of {})",
-                    reporter_->repeatCount(), fileNameOf(results_->table().path())));
+                    reporter_->repeatCount(), reporter_->repeatCount() == 1 ? "has" : "have",
+                    fileNameOf(results_->table().path())));
   }
   if (reporter_->replayedCount() > 0) {
-    state_.log.line(fmt::format("{} of them were taken from the earlier run", reporter_->replayedCount()));
+    state_.log.line(fmt::format("{} of them {} taken from the earlier run", reporter_->replayedCount(),
+                                reporter_->replayedCount() == 1 ? "was" : "were"));
   }
   if (reporter_->lostRunCount() > 0) {
     state_.log.line(fmt::format("{} made once more, as the worker that had it was lost",

@@ -122,6 +122,35 @@ TEST_F(ModelRunTest, NumbersOfAListingAreFoundByInstructions) {
                 ":2:5: expected a number, found \"7.5m\" (the number \"rms\" at i.ins:2:7)");
 }
 
+/// A listing that is in the base folder is one of a run before; without it the first one that is read tells.
+TEST_F(ModelRunTest, InstructionsThatAListingDoesNotFitOrThatCutItsNumbersAreWarnedOf) {
+  description_.measures[0].interfaceType = InterfaceType::measureFile;
+  description_.measureFile = folder_ / "base/out/listing.txt";
+  folder_.write("base/out/keep", "");
+  std::string reason;
+  description_.instructions =
+      std::make_shared<const InstructionFile>(InstructionFile::parse("i.ins", "pif ~\nl1 [rms]5:7\n", reason).value());
+  const auto warnings = [this](const char* before) {
+    before == nullptr ? void(std::filesystem::remove(description_.measureFile))
+                      : void(folder_.write("base/out/listing.txt", before));
+    makeRunner(launcher_, 1);
+    return runner_->output().warnings();
+  };
+  EXPECT_THAT(
+      warnings("RMS x\n"),
+      ElementsAre(AllOf(StartsWith(description_.measureFile + ":1:5: expected a number, found \"x\" (the number "
+                                                              "\"rms\" at i.ins:2:4)\nThis listing, as it is in"),
+                        HasSubstr("A model run that writes such a one has failed"))));
+  EXPECT_THAT(warnings("RMS 7.5\n"), ElementsAre());
+  writes("out/listing.txt", "RMS 17.51\n");
+  EXPECT_THAT(evaluate(2.0).warnings, ElementsAre(HasSubstr("the columns 5:7 cut \"17.51\"")));
+  EXPECT_THAT(warnings("RMS 17.51\n"), ElementsAre(HasSubstr(":1:5: the columns 5:7 cut \"17.51\", of which \"17.\"")));
+  EXPECT_THAT(warnings(nullptr), ElementsAre());
+  writes("out/listing.txt", "RMS 17.51\n");
+  EXPECT_THAT(evaluate(2.0).warnings, ElementsAre(HasSubstr("the columns 5:7 cut \"17.51\"")));
+  EXPECT_THAT(evaluate(2.0).warnings, ElementsAre());
+}
+
 TEST_F(ModelRunTest, MeasureFileValuesAreTakenByTheirNumber) {
   description_.measures[0].interfaceType = InterfaceType::measureFile;
   description_.measures[0].measurementNo = 2;

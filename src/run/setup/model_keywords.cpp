@@ -39,6 +39,41 @@ std::vector<KeywordRow> seriesKeywords(SeriesOf, std::string_view fileMeaning) {
   return rows;
 }
 
+/// Where in a listing the simulated series is.
+std::vector<KeywordRow> listingKeywords() {
+  using Measure = OutputMeasure;
+  return {setting<Measure>([](auto& m) -> auto& { return m.simulation.listingSettings.instructionFile; },
+                           {.name = kInstructionFileKeyword,
+                            .type = KeywordType::fileName,
+                            .defaultValue = kNoDefault,
+                            .meaning = "A file (`pif`) that says where in `File_Name`, which is then a listing of any "
+                                       "form, the numbers of series are. It needs one of the three ways below to tell "
+                                       "their times."}),
+          setting<Measure>([](auto& m) -> auto& { return m.simulation.listingSettings.timesFile; },
+                           {.name = kInstructionTimesKeyword,
+                            .type = KeywordType::fileName,
+                            .defaultValue = kNoDefault,
+                            .meaning = "A CSV table with the columns `name` and `time`, a row for each name in the "
+                                       "instruction file; a column `series` may name the series of each."}),
+          setting<Measure>([](auto& m) -> auto& { return m.simulation.listingSettings.dates; },
+                           {.name = kInstructionDatesKeyword,
+                            .defaultValue = kNoDefault,
+                            .meaning = "The form of the dates in which the names end, of `YYYY`, `MM`, `DD`, `hh`, "
+                                       "`mm` and `ss`: `'YYYYMMDD'` for `flow_19900101`."}),
+          setting<Measure>([](auto& m) -> auto& { return m.simulation.listingSettings.start; },
+                           {.name = kInstructionStartKeyword,
+                            .defaultValue = kNoDefault,
+                            .meaning = "Time of the first number of each series, where the names end in the number of "
+                                       "the step: `h1_1`, `h1_2`."}),
+          setting<Measure>([](auto& m) -> auto& { return m.simulation.listingSettings.stepHours; },
+                           {.name = kInstructionStepKeyword,
+                            .defaultValue = kNoDefault,
+                            .range = {.lowest = 0, .highest = 1e6, .lowestExcluded = true},
+                            .refusal = "Error: Step of the numbers in a listing invalid for output measure ",
+                            .unit = "h",
+                            .meaning = "From one number of a series to the next."})};
+}
+
 /// Which other item of the observation file is meant: `itemOf(weighting)`.
 template <class ItemOf>
 KeywordRow weightingItem(ItemOf, std::string_view keyword, std::string_view meaning) {
@@ -461,11 +496,13 @@ const SettingSection<OutputMeasure>& measureSection() {
 
 const SettingSection<OutputMeasure>& simulationFileSection() {
   static const SettingSection<OutputMeasure> section{
-      {"ObjectiveFunctions/OUTPUT_MEASURES/MEASURE_n/SIMULATION_FILE", "for each measure of interface type 0",
-       "The simulated series.",
-       seriesKeywords(
-           [](auto& m) -> auto& { return m.simulation; },
-           "The simulated time-series file, in or below the base folder.")}};
+      withRows({"ObjectiveFunctions/OUTPUT_MEASURES/MEASURE_n/SIMULATION_FILE", "for each measure of interface type 0",
+                "The simulated series.",
+                seriesKeywords(
+                    [](auto& m) -> auto& { return m.simulation; },
+                    "The simulated time-series file, in or below the base folder."),
+                itemName<OutputMeasure>([](const OutputMeasure& measure) { return measure.name; })},
+               listingKeywords())};
   return section;
 }
 
@@ -617,7 +654,7 @@ const SettingSection<RunConfig>& measureFileSection() {
              .type = KeywordType::fileName,
              .defaultValue = "''",
              .meaning = "A file (`pif`) that says where in the output-measure file the numbers are. Without it, the "
-                        "file has numbers alone."})}}};
+                        "file has numbers alone. Read if a measure has interface type 1."})}}};
   return section;
 }
 

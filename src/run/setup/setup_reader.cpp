@@ -12,6 +12,7 @@
 #include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/text.h"
+#include "measures/listing_series.h"
 #include "measures/text_form_keywords.h"
 #include "parameters/read_template.h"
 #include "platform/processes/argument_text.h"
@@ -78,7 +79,8 @@ class SetupReader final {
     if (config_.task) {
       config_.task->read({target_, config_.parameters, sections_.parameters, config_.constraints,
                           config_.variableParameterCount(),
-                          [this](bool hasInitialSample) { requireScales(hasInitialSample); }, config_.period});
+                          [this](bool hasInitialSample) { requireScales(hasInitialSample); }, config_.period,
+                          config_.setupFolder + "/" + config_.setupName});
       for (std::size_t i = 0; i < config_.parameters.size(); ++i) {
         config_.parameters[i].givenValues = config_.task->givenValues(i);
       }
@@ -102,7 +104,8 @@ class SetupReader final {
   void readObjectiveFunctions();
   void readValidationPeriods(const SetupSection& parent);
   static void locateReference(const SetupSection& section, SeriesReference& reference);
-  void readSeries(const SetupSection& section, OutputMeasure& measure) const;
+  void readSeries(const SetupSection& section, OutputMeasure& measure);
+  void readListing(const SetupSection& section, SeriesReference& simulation);
   void connectMeasures();
   void readSavedFiles();
   void readSimultaneousSimulations();
@@ -116,6 +119,8 @@ class SetupReader final {
   RunConfig config_;
   SectionsRead sections_;
   std::optional<EquationCheck> equations_;  ///< over the parameters, once they are read
+  using Listing = std::pair<ListingSettings, std::shared_ptr<const ListingForm>>;
+  std::vector<Listing> listings_;  ///< that were read
 };
 
 void SetupReader::readSimulationOption() {
@@ -302,7 +307,7 @@ void SetupReader::locateReference(const SetupSection& section, SeriesReference& 
   }
 }
 
-void SetupReader::readSeries(const SetupSection& section, OutputMeasure& measure) const {
+void SetupReader::readSeries(const SetupSection& section, OutputMeasure& measure) {
   const std::int64_t number = std::ssize(config_.measures);
   // A measure that the model writes itself needs no series; its sections are read if present.
   const bool needsSeries = measure.interfaceType == InterfaceType::timeSeries;
@@ -319,6 +324,7 @@ void SetupReader::readSeries(const SetupSection& section, OutputMeasure& measure
     if (!measure.simulation.fileName.empty()) {
       validateInBaseFolder(measure.simulation.fileName, config_.baseFolder, "File_Name", *simulated);
     }
+    if (needsSeries) readListing(*simulated, measure.simulation);
   }
   if (const auto observed = open("OBSERVATION_FILE")) {
     observed->read(observationFileSection(), measure);
@@ -343,6 +349,38 @@ void SetupReader::readSeries(const SetupSection& section, OutputMeasure& measure
     above->read(shownAboveSection(), measure.shownAbove);
     locateReference(*above, measure.shownAbove);
   }
+}
+
+/// What of a listing is a series. Files are read once for all measures with the same settings.
+void SetupReader::readListing(const SetupSection& section, SeriesReference& simulation) {
+  const ListingSettings& settings = simulation.listingSettings;
+  if (settings.instructionFile.empty()) {
+    for (const std::string_view keyword :
+         {kInstructionTimesKeyword, kInstructionDatesKeyword, kInstructionStartKeyword, kInstructionStepKeyword}) {
+      if (section.isWritten(keyword)) {
+        section.warn(keyword, fmt::format("has no effect without {}", kInstructionFileKeyword));
+      }
+    }
+    return;
+  }
+  if (simulation.form.isGiven) {
+    section.refuse("Error: Form of a text file invalid", kInstructionFileKeyword,
+                   "the file is either a text table or a listing that instructions read: leave out this keyword, or "
+                   "those that tell the form of a table");
+  }
+  const auto known = std::ranges::find(listings_, settings, &Listing::first);
+  if (known != listings_.end()) {
+    simulation.listing = known->second;
+    return;
+  }
+  ListingFault fault;
+  simulation.listing = ListingForm::read(settings, fault);
+  if (!simulation.listing) {
+    section.refuse(fault.keyword == kInstructionFileKeyword ? "Error: Invalid instruction file"
+                                                            : "Error: Invalid times of the numbers in a listing",
+                   fault.keyword, fault.text);
+  }
+  listings_.emplace_back(settings, simulation.listing);
 }
 
 /// Adds to each objective function the measures that name it.
@@ -424,7 +462,9 @@ void SetupReader::readMeasureFile() {
 
 /// Where the numbers of the output-measure file are, and the numbers of the measures that name them.
 void SetupReader::readInstructions(const SetupSection& section) {
-  if (!config_.instructionFile.empty()) {
+  if (!config_.instructionFile.empty() && !config_.readsMeasureFile()) {
+    section.warn("Instruction_File", "not read, as no output measure has Interface_Type = 1");
+  } else if (!config_.instructionFile.empty()) {
     std::string reason;
     const auto text = readTextFile(config_.instructionFile, reason);
     if (!text) {

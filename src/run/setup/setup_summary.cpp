@@ -67,8 +67,8 @@ class Summary final {
     line("Objective functions: {}", config_.objectives.size());
     for (const ObjectiveFunction& function : config_.objectives) {
       std::string text =
-          fmt::format("  {}: {} of {} output measures, weight {}", function.name,
-                      codeName(kFunctionTypeNames, function.functionType), function.measures.size(), function.weight);
+          fmt::format("  {}: {} of {}, weight {}", function.name, codeName(kFunctionTypeNames, function.functionType),
+                      countText(function.measures.size(), "output measure"), function.weight);
       if (function.standardDeviation) text += fmt::format(", standard deviation {}", *function.standardDeviation);
       if (function.location) text += fmt::format(", location {}", *function.location);
       line("{}", text);
