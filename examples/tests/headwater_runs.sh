@@ -1,12 +1,12 @@
 #!/bin/sh
 # The staged example with its engine, r.topmodel of GRASS GIS, installed: the calibration improves the fit, its KGE is that
 # of the engine's listing, computed apart, and a listing of NaN, with which the engine ends well, is a failed model run.
-# Usage: headwater_runs.sh MIREVO STAGED_EXAMPLE
+# Usage: headwater_runs.sh MIREVO SERIES_STATISTICS STAGED_EXAMPLE
 set -eu
-test -f "$2/model/discharge.csv" || { echo "run $2/install first"; exit 1; }
+test -f "$3/model/discharge.csv" || { echo "run $3/install first"; exit 1; }
 folder=$(mktemp -d)
 trap 'rm -rf "$folder"' EXIT
-cp -R "$2/model" "$2/data" "$2/headwater.kdx" "$folder"
+cp -R "$3/model" "$3/data" "$3/headwater.kdx" "$folder"
 cd "$folder"
 run() { VOLK_PROGRESS=NONE "$1" "$2.kdx" || { cat "$2.log"; exit 1; }; }
 # KGE in the calibration and the validation of the last evaluation; the parameters of the last, too.

@@ -2,17 +2,17 @@
 # The staged example with its engine, EPANET, installed: the calibration finds the coefficients with which the pressures
 # were made, within the intervals of a sensitivity analysis; what the program reads of the engine's results is what the
 # engine's own package reads; and a network that the engine refuses is a failed model run with the engine's message.
-# Usage: net1_runs.sh MIREVO STAGED_EXAMPLE
+# Usage: net1_runs.sh MIREVO SERIES_STATISTICS STAGED_EXAMPLE
 set -eu
-test -d "$2/node_modules/epanet-js" || { echo "run $2/install first"; exit 1; }
+test -d "$3/node_modules/epanet-js" || { echo "run $3/install first"; exit 1; }
 folder=$(mktemp -d)
 trap 'rm -rf "$folder"' EXIT
-cp -R "$2/model" "$2/data" "$2/node_modules" "$2/net1.kdx" "$folder"
+cp -R "$3/model" "$3/data" "$3/node_modules" "$3/net1.kdx" "$folder"
 cd "$folder"
 run() { VOLK_PROGRESS=NONE "$1" "$2.kdx" || { cat "$2.log"; exit 1; }; }
 
 cp data/pressures.csv expected.csv
-"$2/prepare-data" .
+"$3/prepare-data" .
 cmp data/pressures.csv expected.csv
 
 sed 's/ Option = 2/ Option = 0/' net1.kdx >once.kdx
@@ -50,6 +50,33 @@ console.log(`RMSE ${errors.join(' ')}`);
 END
 errors=$(node errors.mjs)
 grep -q ", $errors\$" best.txt || { echo "the package reads: $errors"; exit 1; }
+
+# Every item of the results is what the package reads: all results of each node, then of each link.
+cat >items.mjs <<'END'
+import { readFileSync } from 'node:fs';
+import { readBinary } from 'epanet-js';
+const { nodes, links } = readBinary(readFileSync('net1_Process1/net1.out')).results;
+const nodeResults = ['demand', 'head', 'pressure', 'waterQuality'];
+const linkResults = ['flow', 'velocity', 'headloss', 'avgWaterQuality', 'status', 'setting', 'reactionRate', 'friction'];
+const items = [...nodes.flatMap((node) => nodeResults.map((result) => node[result])),
+  ...links.flatMap((link) => linkResults.map((result) => link[result]))];
+console.log(['time', ...items.keys()].join(','));
+for (let hour = 0; hour < items[0].length; ++hour) {
+  const time = new Date(Date.UTC(2000, 0, 1, hour)).toISOString().slice(0, 16);
+  console.log([time, ...items.map((item) => item[hour])].join(','));
+}
+END
+node items.mjs >items.csv
+item=0
+while [ $item -lt 148 ]; do
+  item=$((item + 1))
+  fit=$("$2" net1_Process1/net1.out items.csv 2000-01-01 2000-01-02 $item $item)
+  case $fit in
+    "25 values, "*" RMSE 0.00, "*) ;;
+    *) echo "item $item is not what the package reads: $fit"; exit 1 ;;
+  esac
+done
+echo "$item items are what the package reads"
 
 # The true coefficients lie within the intervals that the analysis gives at the best set.
 awk -v best="$(sed 's/.*: C //; s/,.*//' best.txt)" '
