@@ -13,7 +13,6 @@
 #include "common/clock.h"
 #include "common/fatal_error.h"
 #include "common/file_lock.h"
-#include "common/files.h"
 #include "common/progress_messages.h"
 #include "common/replaceable_files.h"
 #include "common/run_files.h"
@@ -35,7 +34,6 @@
 #include "run/run_series.h"
 #include "run/setup/setup_reader.h"
 #include "run/setup/setup_summary.h"
-#include "run/setup/setup_warnings.h"
 #include "run/signal_handlers.h"
 #include "run/stop_run.h"
 #include "run/worker_run.h"
@@ -118,19 +116,8 @@ void RunDriver::openRun(const std::string& setupFileName) {
   installSignalHandlers();
   const SetupLocation setup = locateSetup(setupFileName);
   filePrefix_ = setup.folder + "/" + setup.name;
+  requireSetupFile(setup);
   std::error_code ignored;
-  if (const std::string fault = faultOfFile(setup.folder); fault == std::strerror(ENOENT)) {
-    fatalError("Error: Unable to open " + setup.file, fmt::format("there is no folder {}", setup.folder));
-  } else if (fault.empty()) {
-    fatalError("Error: Unable to open " + setup.file, fmt::format("{} is a file and no folder", setup.folder));
-  }
-  if (const std::string fault = faultOfFile(setup.file);
-      !fault.empty() && std::filesystem::exists(setup.file, ignored)) {
-    fatalError("Error: Unable to open " + setup.file, fault);  // before files are created beside it: it may be in /dev
-  } else if (const std::string meant = setup.file + ".kdx"; !fault.empty() && faultOfFile(meant).empty()) {
-    // The run's files would be those of that setup, of which a run may be going on.
-    fatalError("Error: Unable to open " + setup.file, fmt::format("{}; did you mean {}?", fault, meant));
-  }
   if (!runLock_.take(runFilePath(filePrefix_, run_files::kRunLock), {}, kLockPatienceSeconds)) {
     fatalError(kAnotherRun,
                fmt::format("{}: another run{} writes the files {}*. Wait for it, or run a copy under another name.",
@@ -234,20 +221,7 @@ void RunDriver::tellOfFolders(const FoldersMade& made) {
 void RunDriver::logSetup() {
   state_.log.line("");
   state_.log.line(setupSummary(config_, parameters_->searchSpace(), parameters_->evaluationOrder()));
-  if (config_.task) {
-    for (const std::string& text : config_.task->warnings(parameters_->searchSpace())) state_.log.warning(text);
-  }
-  for (const std::string& text : runner_->warnings()) state_.log.warning(text);
-  for (const std::string& text : runner_->output().warnings()) state_.log.warning(text);
-  for (const std::string& text :
-       unusedParameterWarnings(config_.parameters, config_.constraints, runner_->templates())) {
-    state_.log.warning(text);
-  }
-  for (const ParameterTemplate& parameterTemplate : runner_->templates()) {
-    for (const std::string& text : parameterTemplate.narrowPlaceholderWarnings(config_.parameters)) {
-      state_.log.warning(text);
-    }
-  }
+  for (const std::string& text : modelDoubts(config_, *parameters_, *runner_)) state_.log.warning(text);
   if (state_.job->hasWorkers()) {
     state_.log.line(fmt::format("{} job: this master and {} workers, each of which runs one model at a time",
                                 state_.job->means(), state_.job->processCount() - 1));

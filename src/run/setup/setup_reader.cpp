@@ -2,6 +2,8 @@
 
 #include <algorithm>
 #include <array>
+#include <cerrno>
+#include <cstring>
 #include <filesystem>
 #include <optional>
 #include <unordered_map>
@@ -477,6 +479,22 @@ RunConfig readSetup(const std::string& fileName, std::string_view text, RunLog& 
 
 RunConfig readSetupFile(const std::string& fileName, RunLog& log) {
   return readSetup(fileName, readSetupText(fileName), log);
+}
+
+void requireSetupFile(const SetupLocation& setup) {
+  const std::string unopened = "Error: Unable to open " + setup.file;
+  if (const std::string fault = faultOfFile(setup.folder); fault == std::strerror(ENOENT)) {
+    fatalError(unopened, fmt::format("there is no folder {}", setup.folder));
+  } else if (fault.empty()) {
+    fatalError(unopened, fmt::format("{} is a file and no folder", setup.folder));
+  }
+  const std::string fault = faultOfFile(setup.file);
+  if (fault.empty()) return;
+  std::error_code ignored;
+  if (std::filesystem::exists(setup.file, ignored)) fatalError(unopened, fault);  // it may be in /dev
+  // The run's files would be those of that setup, of which a run may be going on.
+  const std::string meant = setup.file + ".kdx";
+  if (faultOfFile(meant).empty()) fatalError(unopened, fmt::format("{}; did you mean {}?", fault, meant));
 }
 
 std::string readSetupText(const std::string& fileName) {
