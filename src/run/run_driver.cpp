@@ -252,6 +252,7 @@ void RunDriver::openResults() {
   scenarioSeries_ = openScenarioSeries(config_, runner_->output(), runFilePath(filePrefix_, run_files::kScenarioSeries),
                                        earlier != nullptr, state_.log);
   if (scenarioSeries_) reporter_->recordScenarios(*scenarioSeries_);
+  openHook();
   failedRunPolicy_.emplace(config_.plannedEvaluations(), config_.failedRunFolders);
   if (state_.job->hasWorkers()) {
     state_.workers.emplace(*state_.job, config_.maxWorkerSilence, state_.clock);
@@ -261,6 +262,44 @@ void RunDriver::openResults() {
     evaluator_ = std::make_unique<LocalEvaluator>(*runner_, *reporter_, *failedRunPolicy_,
                                                   config_.simultaneousSimulations, earlier, &slotUse_);
   }
+}
+
+void RunDriver::openHook() {
+  if (trim(config_.improvementCommand).empty()) return;
+  hook_ = std::make_unique<ImprovementHook>(config_, state_.log);
+  reporter_->followBest(
+      [this](const EvaluationResult& result) {
+        hook_->improved(hookValues(resultRow(reporter_->best()->parameterValues, result)));
+      },
+      [this] { hook_->look(); });
+}
+
+HookValues RunDriver::hookValues(const ResultRow& row) const {
+  HookValues values{row.number, row.aggregate, {}, {}, {}};
+  const std::vector<double> all = allModelValues(*parameters_, row.parameters);
+  for (std::size_t i = 0; i < all.size(); ++i) values.parameters.emplace_back(config_.parameters[i].name, all[i]);
+  for (std::size_t i = 0; i < row.measures.size(); ++i) {
+    values.measures.emplace_back(config_.measures[i].name, row.measures[i]);
+  }
+  for (std::size_t i = 0; i < row.objectives.size(); ++i) {
+    values.objectives.emplace_back(config_.objectives[i].name, row.objectives[i]);
+  }
+  return values;
+}
+
+void RunDriver::noteBestForHook() {
+  if (!hook_ || !reporter_->best()) return;
+  const BestEvaluation& best = *reporter_->best();
+  auto row = results_->table().rowOf(best.number);
+  if (!row) return;
+  row->aggregate = best.aggregate;
+  bestAtEnd_ = hookValues(*row);
+}
+
+void RunDriver::finishHook(std::string_view state) {
+  if (!hook_) return;
+  hook_->finish(state, bestAtEnd_, [this] { return state_.progress.isCancelled(); });
+  hook_.reset();
 }
 
 /// If the run were killed, an earlier report would be taken for its own. That of a run that goes on is removed, as it
@@ -402,11 +441,16 @@ void RunDriver::finish(const TaskOutcome& outcome) {
   results_->close();
   logDifferences();
   results_->writeTables(outcome.tables, state_.log);
+  noteBestForHook();
   const Ending ending{RunStage::finished, outcome.terminationMessage, outcome.terminationMessage};
   if (const auto unwritten = closeResults(ending, outcome.report)) {
     fatalError("Error: Unable to write to " + unwritten->path, unwritten->reason);
   }
   reportRun();
+  // The command may take long, and what becomes of it is told by the log: the workers do not wait for it.
+  const bool hasHook = hook_ != nullptr;
+  if (hasHook) leaveJob(state_, 0);
+  finishHook("finished");
   state_.log.line("");
   for (const std::string& line : reporter_->comparisonLines()) state_.log.line(line);
   const int count = reporter_->evaluationCount();
@@ -435,7 +479,7 @@ void RunDriver::finish(const TaskOutcome& outcome) {
     fatalError("Error: Unable to write to " + state_.log.path(), state_.log.writeError());
   }
   signalState.runLogDescriptor = -1;
-  leaveJob(state_, 0);
+  if (!hasHook) leaveJob(state_, 0);
   state_.log.close();
   if (!state_.log.writeError().empty()) {
     showMessage(fmt::format("Warning: The end of {} may be missing: {}", state_.log.path(), state_.log.writeError()));
@@ -521,10 +565,11 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
     tellOfBestThatDiffers();
   }
   stopWorkersOf(state_);
+  noteBestForHook();
   closeResultsOfEarlyEnd({RunStage::failed, std::string(message), explained}, statistics);
   if (launcher_) launcher_->haltProcesses();  // before the report, which takes time
   reportRun();
-  return endEarly(message);
+  return endEarly(message, "failed");
 }
 
 /// What explains the message stands above it.
@@ -555,6 +600,7 @@ int RunDriver::endCancelled(std::string_view message) {
   const std::vector<std::string> statistics = keepStatistics();
   logDifferences();
   tellOfBestThatDiffers();
+  noteBestForHook();
   closeResultsOfEarlyEnd({RunStage::cancelled, std::string(message), std::string(message)}, statistics);
   {
     const EndingSignalsHeld held;
@@ -564,14 +610,15 @@ int RunDriver::endCancelled(std::string_view message) {
   }
   if (launcher_) launcher_->haltProcesses();
   reportRun();
-  return endEarly(message);
+  return endEarly(message, "cancelled");
 }
 
-int RunDriver::endEarly(std::string_view ending) {
+int RunDriver::endEarly(std::string_view ending, std::string_view state) {
   signalState.runLogDescriptor = -1;
   state_.log.close();
   if (launcher_) launcher_->haltProcesses();
   leaveJob(state_, 1);
+  finishHook(state);
   endProgress(ending);
   tellOfWarnings();
   return 1;

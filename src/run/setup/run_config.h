@@ -36,7 +36,9 @@ struct RunConfig {
 
   std::unique_ptr<Task> task;  ///< nullptr if the simulation option names none: nothing is run
   std::string title;
-  bool writesReport = true;  ///< a report at the end of the run
+  bool writesReport = true;              ///< a report at the end of the run
+  std::string improvementCommand;        ///< run by the shell when the best set improves and at the end; empty: none
+  double improvementCommandTime = 60.0;  ///< longest time of it, s
   std::vector<BatchItem> batchItems;
   std::string baseFolder;  ///< the folder of the first batch file
   std::vector<ParameterFileItem> parameterFiles;

@@ -188,6 +188,8 @@ TEST_F(SetupReaderTest, EchoesEverySectionAndValueInReadingOrder) {
                               "  Reuse_Results = 1 ('yes') (default)\n"
                               "  FailedRunFolders = 3 (default)\n"
                               "  Report = 1 ('yes') (default)\n"
+                              "  Improvement_Command = '' (default)\n"
+                              "  Improvement_Command_Time = 60 (default)\n"
                               "[MIREVO_SIMULATION_OPTION/SIMBATCH]\n"
                               "  TqSEKdxListItemCount = 1\n"
                               "[MIREVO_SIMULATION_OPTION/SIMBATCH/SIMBATCHITEM_1]\n"
