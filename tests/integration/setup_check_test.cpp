@@ -68,6 +68,8 @@ TEST(SetupCheck, SaysWhatIsWrong) {
   };
   const Case cases[] = {
       {"Lower_Bound = 0.0", "Lowr_Bound = 0.0", "", "did you mean \"Lower_Bound\"?", false},
+      {"    Title", "    Base_Folder = 'none'\n    Title", "", "/none\n", false},
+      {"    Title", "    Base_Folder = '.'\n    Title", "", "", false},
       {"'observed.csv'", "'observd.csv'", "", "observd.csv: No such file", false},
       {"", "", "echo no licence; exit 7",
        "run.sh exited with code 7\n   no licence\nThe folder in which the model was run is kept: ", true},

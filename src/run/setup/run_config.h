@@ -40,7 +40,7 @@ struct RunConfig {
   std::string improvementCommand;        ///< run by the shell when the best set improves and at the end; empty: none
   double improvementCommandTime = 60.0;  ///< longest time of it, s
   std::vector<BatchItem> batchItems;
-  std::string baseFolder;  ///< the folder of the first batch file
+  std::string baseFolder;  ///< of which model runs get a copy; of the first batch file, unless the setup names one
   std::vector<ParameterFileItem> parameterFiles;
   std::vector<ModelParameter> parameters;
   std::vector<InternalConstraint> constraints;

@@ -41,6 +41,13 @@ const SettingSection<RunConfig>& simulationOptionSection() {
                                     .defaultValue = "''",
                                     .meaning = "Title of the run, in the log and the result files.",
                                     .bearsOnResults = kNotOfResults}),
+        setting<&RunConfig::baseFolder>(
+            {.name = "Base_Folder",
+             .type = KeywordType::fileName,
+             .defaultValue = "''",
+             .meaning = "Folder with all files of the model, which each model run gets a copy of: for batch files in "
+                        "folders beside one another. Blank: the folder of the first batch file.",
+             .bearsOnResults = kNotOfResults}),
         setting<&RunConfig::restart>(
             {.name = "Restart",
              .defaultValue = "0",

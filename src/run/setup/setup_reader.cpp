@@ -94,6 +94,7 @@ class SetupReader final {
 
  private:
   void readSimulationOption();
+  void checkBaseFolder(const SetupSection& section);
   void checkBatchItem(const SetupSection& section, const BatchItem& item);
   void refuseNameOfSetup(const std::string& path, std::string_view keyword, const SetupSection& section) const;
   void checkParameterFile(const SetupSection& section, const ParameterFileItem& item) const;
@@ -122,6 +123,7 @@ class SetupReader final {
 void SetupReader::readSimulationOption() {
   const SetupSection section = target_.open("MIREVO_SIMULATION_OPTION");
   section.read(simulationOptionSection(), config_);
+  checkBaseFolder(section);
   file_.need(seriesSections(target_));
   if (config_.task) {
     file_.need(config_.task->neededSections(target_));
@@ -143,6 +145,16 @@ void SetupReader::readSimulationOption() {
                  });
 }
 
+/// As the setup has it; most have none.
+void SetupReader::checkBaseFolder(const SetupSection& section) {
+  std::string& folder = config_.baseFolder;
+  if (folder.empty()) return;
+  while (folder.size() > 1 && folder.back() == '/') folder.pop_back();
+  std::error_code failed;
+  if (std::filesystem::is_directory(folder, failed)) return;
+  section.refuse("Error: Invalid base folder", "Base_Folder", fmt::format("there is no folder {}", folder));
+}
+
 void SetupReader::checkBatchItem(const SetupSection& section, const BatchItem& item) {
   constexpr std::string_view kKeyword = "BatchFileName";
   const std::string& path = item.batchFileName;
@@ -150,7 +162,9 @@ void SetupReader::checkBatchItem(const SetupSection& section, const BatchItem& i
     section.refuse("Error: No model simulation sequence defined", kKeyword, "expected the name of a file");
   }
   const bool isFirst = &item == &config_.batchItems.front();
-  if (isFirst) config_.baseFolder = std::filesystem::path(path).parent_path().string();
+  if (isFirst && config_.baseFolder.empty()) {
+    config_.baseFolder = std::filesystem::path(path).parent_path().string();
+  }
   validateInBaseFolder(path, config_.baseFolder, kKeyword, section);
   validateFileExists(path, kKeyword, section);
   refuseNameOfSetup(path, kKeyword, section);

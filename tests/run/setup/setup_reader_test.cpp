@@ -184,6 +184,7 @@ TEST_F(SetupReaderTest, EchoesEverySectionAndValueInReadingOrder) {
                               "[MIREVO_SIMULATION_OPTION]\n"
                               "  Option = 2 ('optimisation')\n"
                               "  Title = 'Upper catchment'\n"
+                              "  Base_Folder = '' (default)\n"
                               "  Restart = 0 ('no') (default)\n"
                               "  Reuse_Results = 1 ('yes') (default)\n"
                               "  FailedRunFolders = 3 (default)\n"
