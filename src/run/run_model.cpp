@@ -11,6 +11,7 @@
 #include "common/run_files.h"
 #include "common/text.h"
 #include "measures/item_names.h"
+#include "run/setup/setup_warnings.h"
 
 namespace mirevo {
 ModelDescription describeModel(const RunConfig& config) {
@@ -51,6 +52,21 @@ LauncherSettings launcherSettings(const RunConfig& config, int slotCount, int fi
   settings.useSingleThread = config.useSingleThread;
   settings.maxSeconds = config.maxSimulationTime;
   return settings;
+}
+
+std::vector<std::string> modelDoubts(const RunConfig& config, const ParameterModel& parameters, ModelRunner& runner) {
+  std::vector<std::string> doubts;
+  const auto add = [&doubts](const std::vector<std::string>& texts) {
+    doubts.insert(doubts.end(), texts.begin(), texts.end());
+  };
+  if (config.task) add(config.task->warnings(parameters.searchSpace()));
+  add(runner.warnings());
+  add(runner.output().warnings());
+  add(unusedParameterWarnings(config.parameters, config.constraints, runner.templates()));
+  for (const ParameterTemplate& parameterTemplate : runner.templates()) {
+    add(parameterTemplate.narrowPlaceholderWarnings(config.parameters));
+  }
+  return doubts;
 }
 
 }  // namespace mirevo

@@ -32,6 +32,13 @@ class Mpi : public ::testing::Test {
   ModelFolder folder_;
 };
 
+TEST_F(Mpi, OneProcessChecksTheSetup) {
+  const ProgramResult result = runJob(3, {"--check", folder_.writeSetup({})});
+  EXPECT_EQ(result.exitCode, 0) << result.error;
+  EXPECT_EQ(occurrences(result.output, "Check of "), 1);
+  EXPECT_EQ(occurrences(result.output, "Nothing is wrong"), 1);
+}
+
 TEST_F(Mpi, AJobWritesTheResultsOfAPlainRun) {
   const std::pair<RunSettings, int> cases[] = {
       {{.maxEvaluations = 25}, 2},

@@ -137,6 +137,11 @@ HelperProcess::Outcome HelperProcess::receive(void* bytes, std::size_t size, Rea
   return transfer(static_cast<char*>(bytes), size, false, watch);
 }
 
+bool HelperProcess::hasAnswer() const {
+  pollfd ready{socket_, POLLIN, 0};
+  return socket_ >= 0 && ::poll(&ready, 1, 0) == 1;
+}
+
 HelperProcess::Outcome HelperProcess::transfer(char* bytes, std::size_t size, bool isSending, ReadingWatch& watch) {
   while (size > 0) {
     const ssize_t moved = isSending ? ::send(socket_, bytes, size, MSG_NOSIGNAL) : ::recv(socket_, bytes, size, 0);

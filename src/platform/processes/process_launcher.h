@@ -17,7 +17,7 @@ struct BatchItem {
 };
 
 struct LauncherSettings {
-  std::string baseFolder;                  ///< absolute; folder of the first batch file; copied, never written to
+  std::string baseFolder;                  ///< absolute; with all files of the model; copied, never written to
   std::string processFolderPrefix;         ///< absolute; the slot's folder without its number, which follows
   std::vector<BatchItem> batchItems;       ///< at least one
   std::vector<std::string> ownFiles = {};  ///< below the base folder, with their leading "/": in no other slot's folder

@@ -36,9 +36,11 @@ struct RunConfig {
 
   std::unique_ptr<Task> task;  ///< nullptr if the simulation option names none: nothing is run
   std::string title;
-  bool writesReport = true;  ///< a report at the end of the run
+  bool writesReport = true;              ///< a report at the end of the run
+  std::string improvementCommand;        ///< run by the shell when the best set improves and at the end; empty: none
+  double improvementCommandTime = 60.0;  ///< longest time of it, s
   std::vector<BatchItem> batchItems;
-  std::string baseFolder;  ///< the folder of the first batch file
+  std::string baseFolder;  ///< of which model runs get a copy; of the first batch file, unless the setup names one
   std::vector<ParameterFileItem> parameterFiles;
   std::vector<ModelParameter> parameters;
   std::vector<InternalConstraint> constraints;

@@ -2,6 +2,8 @@
 
 #include <algorithm>
 #include <array>
+#include <cerrno>
+#include <cstring>
 #include <filesystem>
 #include <optional>
 #include <unordered_map>
@@ -95,6 +97,7 @@ class SetupReader final {
 
  private:
   void readSimulationOption();
+  void checkBaseFolder(const SetupSection& section);
   void checkBatchItem(const SetupSection& section, const BatchItem& item);
   void refuseNameOfSetup(const std::string& path, std::string_view keyword, const SetupSection& section) const;
   void checkParameterFile(const SetupSection& section, const ParameterFileItem& item) const;
@@ -126,6 +129,7 @@ class SetupReader final {
 void SetupReader::readSimulationOption() {
   const SetupSection section = target_.open("MIREVO_SIMULATION_OPTION");
   section.read(simulationOptionSection(), config_);
+  checkBaseFolder(section);
   file_.need(seriesSections(target_));
   if (config_.task) {
     file_.need(config_.task->neededSections(target_));
@@ -147,6 +151,16 @@ void SetupReader::readSimulationOption() {
                  });
 }
 
+/// As the setup has it; most have none.
+void SetupReader::checkBaseFolder(const SetupSection& section) {
+  std::string& folder = config_.baseFolder;
+  if (folder.empty()) return;
+  while (folder.size() > 1 && folder.back() == '/') folder.pop_back();
+  std::error_code failed;
+  if (std::filesystem::is_directory(folder, failed)) return;
+  section.refuse("Error: Invalid base folder", "Base_Folder", fmt::format("there is no folder {}", folder));
+}
+
 void SetupReader::checkBatchItem(const SetupSection& section, const BatchItem& item) {
   constexpr std::string_view kKeyword = "BatchFileName";
   const std::string& path = item.batchFileName;
@@ -154,7 +168,9 @@ void SetupReader::checkBatchItem(const SetupSection& section, const BatchItem& i
     section.refuse("Error: No model simulation sequence defined", kKeyword, "expected the name of a file");
   }
   const bool isFirst = &item == &config_.batchItems.front();
-  if (isFirst) config_.baseFolder = std::filesystem::path(path).parent_path().string();
+  if (isFirst && config_.baseFolder.empty()) {
+    config_.baseFolder = std::filesystem::path(path).parent_path().string();
+  }
   validateInBaseFolder(path, config_.baseFolder, kKeyword, section);
   validateFileExists(path, kKeyword, section);
   refuseNameOfSetup(path, kKeyword, section);
@@ -531,6 +547,22 @@ RunConfig readSetup(const std::string& fileName, std::string_view text, RunLog& 
 
 RunConfig readSetupFile(const std::string& fileName, RunLog& log) {
   return readSetup(fileName, readSetupText(fileName), log);
+}
+
+void requireSetupFile(const SetupLocation& setup) {
+  const std::string unopened = "Error: Unable to open " + setup.file;
+  if (const std::string fault = faultOfFile(setup.folder); fault == std::strerror(ENOENT)) {
+    fatalError(unopened, fmt::format("there is no folder {}", setup.folder));
+  } else if (fault.empty()) {
+    fatalError(unopened, fmt::format("{} is a file and no folder", setup.folder));
+  }
+  const std::string fault = faultOfFile(setup.file);
+  if (fault.empty()) return;
+  std::error_code ignored;
+  if (std::filesystem::exists(setup.file, ignored)) fatalError(unopened, fault);  // it may be in /dev
+  // The run's files would be those of that setup, of which a run may be going on.
+  const std::string meant = setup.file + ".kdx";
+  if (faultOfFile(meant).empty()) fatalError(unopened, fmt::format("{}; did you mean {}?", fault, meant));
 }
 
 std::string readSetupText(const std::string& fileName) {
