@@ -76,10 +76,13 @@ OutputReader::OutputReader(const ModelDescription& description, const ObjectiveA
     if (measure.interfaceType != InterfaceType::measureFile) continue;
     numbersNeeded_ = std::max(numbersNeeded_, static_cast<std::size_t>(measure.measurementNo));
   }
-  if (std::error_code none; !description.measureFile.empty()) {
-    const std::uintmax_t size = std::filesystem::file_size(trimTrailing(description.measureFile), none);
-    if (!none) usualNumbers_ = size;
-  }
+  const auto noteSize = [this](const std::string& file) {
+    std::error_code none;
+    const std::uintmax_t size = std::filesystem::file_size(trimTrailing(file), none);
+    usualNumbers_.push_back(none ? 0 : size);
+  };
+  noteSize(description.measureFile);
+  for (const MeasureFileSource& file : description.furtherMeasureFiles) noteSize(file.fileName);
   for (std::size_t i = 0; i < description.measures.size() && description.keepSimulatedValues; ++i) {
     const OutputMeasure& measure = description.measures[i];
     if (measure.interfaceType != InterfaceType::timeSeries) continue;
@@ -232,6 +235,7 @@ EvaluationResult OutputReader::failedResult(EvaluationFailure failure) const {
 std::optional<EvaluationFailure> OutputReader::findMissing(const OutputFiles& files) {
   std::vector<std::string> wanted = files.simulationFiles;
   if (!files.measureFile.empty()) wanted.push_back(files.measureFile);
+  wanted.insert(wanted.end(), files.furtherMeasureFiles.begin(), files.furtherMeasureFiles.end());
   for (const std::string& path : wanted) {
     struct stat status {};
     if (::stat(path.c_str(), &status) == 0) {
@@ -247,17 +251,32 @@ std::optional<EvaluationFailure> OutputReader::findMissing(const OutputFiles& fi
   return std::nullopt;
 }
 
+std::optional<MeasureFile> OutputReader::readNumbers(const OutputFiles& files, std::string& reason) {
+  const auto isTooLarge = [&reason](const std::string& file, std::uintmax_t usual) {
+    const std::string fault = faultOfSize(file, usual);
+    if (!fault.empty()) reason = fmt::format("{}: {}", file, fault);
+    return !fault.empty();
+  };
+  if (isTooLarge(files.measureFile, usualNumbers_.front())) return std::nullopt;
+  auto all =
+      readMeasureFile(files.measureFile, numbersNeeded_, reason, series_.watch(), description_.instructions.get());
+  for (std::size_t i = 0; all && i < files.furtherMeasureFiles.size(); ++i) {
+    const std::string& name = files.furtherMeasureFiles[i];
+    if (isTooLarge(name, usualNumbers_[i + 1])) return std::nullopt;
+    const InstructionFile* const instructions = description_.furtherMeasureFiles[i].instructions.get();
+    const auto more = readMeasureFile(name, 0, reason, series_.watch(), instructions);
+    if (!more) return std::nullopt;
+    all->numbers.insert(all->numbers.end(), more->numbers.begin(), more->numbers.end());
+    all->endsLine = all->endsLine && more->endsLine;
+  }
+  return all;
+}
+
 std::optional<EvaluationFailure> OutputReader::readMeasures(const OutputFiles& files, EvaluationResult& result) {
   MeasureFile written;
   if (!files.measureFile.empty()) {
     std::string reason;
-    std::optional<MeasureFile> file;
-    if (const std::string tooLarge = faultOfSize(files.measureFile, usualNumbers_); !tooLarge.empty()) {
-      reason = fmt::format("{}: {}", files.measureFile, tooLarge);
-    } else {
-      file =
-          readMeasureFile(files.measureFile, numbersNeeded_, reason, series_.watch(), description_.instructions.get());
-    }
+    std::optional<MeasureFile> file = readNumbers(files, reason);
     if (!file) return failureOf(Kind::resultsNotReadable, std::move(reason));
     written = std::move(*file);
   }
@@ -284,8 +303,8 @@ std::optional<EvaluationFailure> OutputReader::readMeasures(const OutputFiles& f
     }
     const auto number = static_cast<std::size_t>(measure.measurementNo);
     if (number <= written.numbers.size()) {
-      result.measureValues[i] = written.numbers[number - 1];
-      if (description_.computeExactMeasures) result.exactMeasures[i] = written.numbers[number - 1];
+      result.measureValues[i] = measure.valueOf(written.numbers[number - 1]);
+      if (description_.computeExactMeasures) result.exactMeasures[i] = result.measureValues[i];
     } else {
       failure = failureOf(Kind::resultsNotReadable, fmt::format("{}: expected at least {} numbers, found {}",
                                                                 files.measureFile, number, written.numbers.size()));
