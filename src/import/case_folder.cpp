@@ -54,13 +54,25 @@ void checkTemplates(ImportedCase& imported) {
   }
   for (std::size_t i = 0; i < imported.parameters.size(); ++i) {
     const ModelParameter& parameter = imported.parameters[i];
+    if (named.contains(i)) continue;
     const std::string in = nameInEquation(parameter.name);
     const bool isUsed = std::any_of(imported.parameters.begin(), imported.parameters.end(),
                                     [&](const auto& other) { return other.equation.find(in) != std::string::npos; });
-    if (named.contains(i) || isUsed) continue;
+    if (isUsed) continue;
     imported.notes.add(NoteKind::toCheck, {imported.source, 0},
                        fmt::format("the parameter {} is in no template and does not reach the model", parameter.name));
   }
+}
+
+/// Reads the output that an earlier model run may have left in the folder. What the import has made was tried before.
+void tryInstructions(ImportedCase& imported, const ImportedOutput& output, const InstructionFile& instructions) {
+  const SourceFiles files(imported.folder);
+  if (imported.newFiles.contains(output.instructionFile) || !files.exists(output.file)) return;
+  std::string reason;
+  if (instructions.read(output.file, files.read(output.file, output.place), reason)) return;
+  imported.notes.add(
+      NoteKind::toCheck, output.place,
+      fmt::format("{} does not read the {} that is here: {}", output.instructionFile, output.file, reason));
 }
 
 void checkOutputs(ImportedCase& imported) {
@@ -72,6 +84,7 @@ void checkOutputs(ImportedCase& imported) {
     const auto file =
         InstructionFile::parse(output.instructionFile, textOf(imported, output.instructionFile, output.place), reason);
     if (!file) failImport(output.place, reason);
+    tryInstructions(imported, output, *file);
     for (const std::string& name : file->names()) {
       if (!read.insert(toLowerAscii(name)).second) {
         failImport(output.place, fmt::format("expected names in {} that no other instruction file has, found {}",

@@ -301,10 +301,14 @@ class OstrichImport final {
       measure.observedValue = *value;
       measure.weight = measure.weightAbove = *weight;
       measure.place = line.place;
-      if (*weight > 0.0 && objective_ != "gcop") {
+      if (*weight > 0.0 && objective_ == "gcop") {
+        notes().addForEach(
+            NoteKind::expressed, line.place,
+            "with ObjectiveFunction GCOP observations count for nothing: the difference is only reported");
+      } else if (*weight > 0.0) {
         measure.objective = group;
         made_.addObjective(group);
-      } else if (*weight == 0.0) {
+      } else {
         notes().addForEach(NoteKind::expressed, line.place, "a weight of 0: the difference is only reported");
         measure.weight = measure.weightAbove = 1.0;
       }
@@ -331,6 +335,11 @@ class OstrichImport final {
   /// The cost of BeginGCOP: response variables, as they are.
   void takeCost() {
     const OstrichBlock* const block = takeBlock("GCOP");
+    if (block != nullptr && objective_ != "gcop" && !made_.objectives.empty()) {
+      notes().add(NoteKind::toCheck, block->place, "BeginGCOP: not in effect without ObjectiveFunction GCOP");
+      for (const OstrichLine& line : block->lines) notes().add(NoteKind::noCounterpart, line.place, line.text);
+      return;
+    }
     std::size_t costs = 0;
     for (std::size_t i = 0; block != nullptr && i < block->lines.size(); ++i) {
       const OstrichLine& line = block->lines[i];
@@ -367,6 +376,12 @@ class OstrichImport final {
                            std::find(std::begin(kParameters), std::end(kParameters), name) != std::end(kParameters);
       if (isTaken && &block == input_.block(name)) continue;
       if (isTaken) failImport(block.place, fmt::format("expected one block Begin{}, found another", block.name));
+      if (name == "extrafiles" || name == "extradirs") {
+        notes().add(NoteKind::expressed, block.place,
+                    fmt::format("Begin{}: each slot has a copy of the whole folder", block.name));
+        for (const OstrichLine& line : block.lines) notes().add(NoteKind::expressed, line.place, line.text);
+        continue;
+      }
       const bool bears = name == "constraints" || name == "tiedrespvars";
       notes().add(bears ? NoteKind::toCheck : NoteKind::noCounterpart, block.place,
                   fmt::format("Begin{}{}", block.name, bears ? ": not in effect in the setup" : ""));

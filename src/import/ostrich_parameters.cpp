@@ -181,6 +181,37 @@ class ParameterImport final {
     made_.parameters.push_back(std::move(parameter));
   }
 
+  /// The equation of a tied parameter over the names `x`, whose type is word `at`, and the number of its coefficients.
+  std::pair<std::string, std::size_t> equationOf(const OstrichLine& line, std::size_t at,
+                                                 const std::vector<std::string>& x) const {
+    const std::string type = toLowerAscii(line.words[at]);
+    const auto c = [&](std::size_t i) { return "(" + formatReal(numberAt(line, at + 1 + i)) + ")"; };
+    std::string equation;
+    std::size_t coefficients = 0;
+    if (type == "linear" && x.size() == 1) {
+      equation = fmt::format("{} * {} + {}", c(0), x[0], c(1));
+      coefficients = 2;
+    } else if (type == "linear" && x.size() == 2) {
+      equation = fmt::format("{} * {} * {} + {} * {} + {} * {} + {}", c(0), x[0], x[1], c(1), x[1], c(2), x[0], c(3));
+      coefficients = 4;
+    } else if (type == "wsum") {
+      for (std::size_t i = 0; i < x.size(); ++i) equation += fmt::format("{}{} * {}", i == 0 ? "" : " + ", c(i), x[i]);
+      coefficients = x.size();
+    } else if (type == "exp" && x.size() == 1) {
+      const bool isNatural = equalIgnoringCase(line.words[std::min(at + 1, line.words.size() - 1)], "exp");
+      equation = isNatural ? fmt::format("{} * exp({} * {}) + {}", c(1), c(2), x[0], c(3))
+                           : fmt::format("{} * {} ^ ({} * {}) + {}", c(1), c(0), c(2), x[0], c(3));
+      coefficients = 4;
+    } else {
+      failImport(line.place,
+                 fmt::format("expected a tied parameter of type linear (of 1 or 2 parameters), wsum or exp, "
+                             "found {} of {}: give {} as a parameter of BeginParams, import, and write its "
+                             "Parameter_Equation into the setup",
+                             quotedForMessage(line.words[at]), x.size(), line.words[0]));
+    }
+    return {equation, coefficients};
+  }
+
   /// name, number of parameters, their names, type, coefficients.
   void addTied(const OstrichLine& line) {
     requireWords(line, 4, "name, number of parameters, their names, type and coefficients");
@@ -191,7 +222,6 @@ class ParameterImport final {
                  fmt::format("expected the number of parameters, found {}", quotedForMessage(line.words[1])));
     }
     std::vector<std::string> x;
-    std::vector<double> values;
     for (std::size_t i = 0; i < names; ++i) {
       const ModelParameter* const parent = made_.parameter(line.words[2 + i]);
       if (parent == nullptr) {
@@ -199,40 +229,15 @@ class ParameterImport final {
                    fmt::format("expected the name of a parameter, found {}", quotedForMessage(line.words[2 + i])));
       }
       x.push_back(nameInEquation(parent->name));
-      values.push_back(parent->initialValue);
     }
     const std::size_t at = 2 + names;
-    const std::string type = toLowerAscii(line.words[at]);
-    const auto c = [&](std::size_t i) { return "(" + formatReal(numberAt(line, at + 1 + i)) + ")"; };
-    std::string equation;
-    std::size_t coefficients = 0;
-    if (type == "linear" && names == 1) {
-      equation = fmt::format("{} * {} + {}", c(0), x[0], c(1));
-      coefficients = 2;
-    } else if (type == "linear" && names == 2) {
-      equation = fmt::format("{} * {} * {} + {} * {} + {} * {} + {}", c(0), x[0], x[1], c(1), x[1], c(2), x[0], c(3));
-      coefficients = 4;
-    } else if (type == "wsum") {
-      for (std::size_t i = 0; i < names; ++i) equation += fmt::format("{}{} * {}", i == 0 ? "" : " + ", c(i), x[i]);
-      coefficients = names;
-    } else if (type == "exp" && names == 1) {
-      const bool isNatural = equalIgnoringCase(line.words[std::min(at + 1, line.words.size() - 1)], "exp");
-      equation = isNatural ? fmt::format("{} * exp({} * {}) + {}", c(1), c(2), x[0], c(3))
-                           : fmt::format("{} * {} ^ ({} * {}) + {}", c(1), c(0), c(2), x[0], c(3));
-      coefficients = 4;
-    } else {
-      failImport(line.place,
-                 fmt::format("expected a tied parameter of type linear (of 1 or 2 parameters), wsum or exp, "
-                             "found {} of {}: give {} as a parameter of BeginParams, import, and write its "
-                             "Parameter_Equation into the setup",
-                             quotedForMessage(line.words[at]), names, line.words[0]));
-    }
+    const auto [equation, coefficients] = equationOf(line, at, x);
     noteFormat(line, at + 1 + coefficients);
     made_.notes.add(NoteKind::toCheck, line.place, fmt::format("read as {} = {}", line.words[0], equation));
     ModelParameter parameter;
     parameter.name = line.words[0];
     parameter.parameterType = ParameterType::dependent;
-    parameter.equation = std::move(equation);
+    parameter.equation = equation;
     made_.parameters.push_back(std::move(parameter));
   }
 

@@ -104,7 +104,8 @@ TEST_F(OstrichCase, OtherSearchesCostsAndBlocksAreTranslatedOrListed) {
   ASSERT_EQ(gcop.objectives.size(), 1U);
   EXPECT_EQ(gcop.objectives[0].type, FunctionType::sum);
   EXPECT_FALSE(gcop.measures.back().observedValue.has_value());
-  EXPECT_THAT(gcop.notes.text(), HasSubstr("ostIn.txt:37: PenaltyFunction APM"));
+  EXPECT_THAT(gcop.notes.text(), AllOf(HasSubstr("ostIn.txt:37: PenaltyFunction APM"),
+                                       HasSubstr("ostIn.txt:27-29: with ObjectiveFunction GCOP observations count")));
 
   const std::string account =
       importOstrich(edited(kOstrichCase, {{"ProgramType  DDS", "ProgramType ParticleSwarm"}})).notes.text();

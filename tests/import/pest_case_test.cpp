@@ -73,6 +73,9 @@ TEST_F(PestCase, NothingIsLeftOutInSilence) {
               HasSubstr("case.pst:3: PESTMODE = regularisation has no counterpart"));
   EXPECT_THAT(importPest(edited(kPestCase, {{"sh model.sh", "model.bat"}})).notes.text(),
               HasSubstr("case.pst:34: the command \"model.bat\" is one of Windows"));
+  folder_.write("src/out.dat", "the heads\n1 x\n");
+  EXPECT_THAT(importPest(kPestCase).notes.text(),
+              HasSubstr("case.pst:37: out.ins does not read the out.dat that is here: out.dat:2:3: expected a number"));
 }
 
 TEST_F(PestCase, RefusesWhatItCannotTranslateWithItsPlace) {

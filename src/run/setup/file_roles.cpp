@@ -86,7 +86,7 @@ void checkParameterFiles(const RunConfig& config, const SectionsRead& sections) 
         refuse("the output-measure file", sections.measureFile->location("File_Name") + ": File_Name");
       }
       if (measure.interfaceType == InterfaceType::measureFile && measure.measureFile == file) {
-        refuse("an output-measure file", sections.measures[0].path());
+        refuse("an output-measure file", "one of FURTHER_FILES");
       }
       if (measure.interfaceType != InterfaceType::timeSeries || measure.simulation.fileName != file) continue;
       refuse("the file of a simulated series",
