@@ -14,7 +14,7 @@ std::string SourcePlace::text() const {
   return line == 0 ? file : fmt::format("{}:{}", file, line);
 }
 
-void ImportNotes::add(NoteKind kind, SourcePlace place, std::string text) {
+void ImportNotes::add(NoteKind kind, SourcePlace place, std::string_view text) {
   const std::size_t line = place.line;
   notes_.push_back({kind, std::move(place), line, onOneLine(text)});
 }

@@ -33,7 +33,7 @@ struct ImportNote {
 /// The account of an import: everything in the source that is not simply in the setup.
 class ImportNotes final {
  public:
-  void add(NoteKind kind, SourcePlace place, std::string text);
+  void add(NoteKind kind, SourcePlace place, std::string_view text);
   /// As the note before it, if that says the same of the line before: one for all of these lines.
   void addForEach(NoteKind kind, const SourcePlace& place, const std::string& text);
 

@@ -89,7 +89,7 @@ class OutputInstructions final {
   }
 
   /// The columns of the keyword's own line count from the keyword on.
-  std::string readingInKeywordsLine(const OstrichNumber& number) {
+  std::string readingInKeywordsLine(const OstrichNumber& number) const {
     const std::size_t words =
         number.separator == ' '
             ? wordsOf(number.keyword).size()
