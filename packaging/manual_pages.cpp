@@ -177,7 +177,8 @@ int setupPage(std::string_view version) {
       fmt::print(".PP\n");
     }
   }
-  fmt::print(".SH SEE ALSO\n.BR Mirevo (1),\n.BR mirevo\\-viewer (1),\n.BR mirevo\\-report (1),\n.BR mirevo\\-import (1)\n");
+  fmt::print(
+      ".SH SEE ALSO\n.BR Mirevo (1),\n.BR mirevo\\-viewer (1),\n.BR mirevo\\-report (1),\n.BR mirevo\\-import (1)\n");
   return 0;
 }
 

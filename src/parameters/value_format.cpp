@@ -88,15 +88,15 @@ std::optional<std::string> roundedForm(double value, int digits, std::size_t wid
       whole.resize(places, '0');
       if (figures.size() > places) part = figures.substr(places);
     }
-    for (const std::string& fixed :
-         {(whole.empty() ? "0" : whole) + "." + (part.empty() ? "0" : part), whole + "." + part}) {
+    for (const std::string& fixed : {fmt::format("{}.{}", whole.empty() ? "0" : whole, part.empty() ? "0" : part),
+                                     fmt::format("{}.{}", whole, part)}) {
       if (sign.size() + fixed.size() <= width) return sign + fixed;
     }
   }
   const std::string part = figures.size() > 1 ? figures.substr(1) : std::string();
   for (const std::string& power :
        {fmt::format("E{}{:02}", exponent < 0 ? '-' : '+', std::abs(exponent)), fmt::format("E{}", exponent)}) {
-    const std::string scaled = sign + figures.substr(0, 1) + "." + part + power;
+    const std::string scaled = fmt::format("{}{}.{}{}", sign, figures.front(), part, power);
     if (scaled.size() <= width) return scaled;
   }
   return std::nullopt;
