@@ -7,6 +7,7 @@
 
 #include "measures/instruction_file.h"
 #include "measures/kept_steps.h"
+#include "measures/measure_file.h"
 #include "measures/objective_functions.h"
 #include "measures/output_measure.h"
 #include "measures/validation_period.h"
@@ -22,6 +23,7 @@ struct ModelDescription {
   std::vector<OutputMeasure> measures;
   std::string measureFile;  ///< output-measure file; empty when no measure is of interface type 1
   std::shared_ptr<const InstructionFile> instructions = {};  ///< where its numbers are; null: in free format
+  std::vector<MeasureFileSource> furtherMeasureFiles = {};   ///< behind the first one
   EvaluationPeriod period;
   std::vector<ValidationPeriod> validationPeriods;
   double minimumCoverage = 0.0;  ///< share of the first successful run's pairs below which a run fails

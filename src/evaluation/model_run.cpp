@@ -125,6 +125,9 @@ ModelRunner::ModelRunner(ModelDescription description, ParameterModel& parameter
       files.output.simulationFiles.push_back(slotPath(name, slot));
     }
     if (!description_.measureFile.empty()) files.output.measureFile = slotPath(description_.measureFile, slot);
+    for (const MeasureFileSource& file : description_.furtherMeasureFiles) {
+      files.output.furtherMeasureFiles.push_back(slotPath(file.fileName, slot));
+    }
   }
 }
 
@@ -153,6 +156,9 @@ FolderNeeds ModelRunner::folderNeeds(const LauncherSettings& settings) const {
       needs.outputs.push_back(belowBase(measure.simulation.fileName));
   }
   if (!description_.measureFile.empty()) needs.outputs.push_back(belowBase(description_.measureFile));
+  for (const MeasureFileSource& file : description_.furtherMeasureFiles) {
+    needs.outputs.push_back(belowBase(file.fileName));
+  }
   for (const std::string& name : description_.savedFiles) needs.savedFiles.push_back(belowBase(name));
   for (const BatchItem& item : settings.batchItems) needs.batchFiles.push_back(belowBase(item.batchFileName));
   return needs;
@@ -172,6 +178,7 @@ void ModelRunner::requireFilesInBaseFolder() const {
     if (measure.interfaceType == InterfaceType::timeSeries) names.push_back(measure.simulation.fileName);
   }
   if (!description_.measureFile.empty()) names.push_back(description_.measureFile);
+  for (const MeasureFileSource& file : description_.furtherMeasureFiles) names.push_back(file.fileName);
   names.insert(names.end(), description_.savedFiles.begin(), description_.savedFiles.end());
   for (const std::string& name : names) {
     if (name.starts_with(description_.baseFolder + "/")) continue;
@@ -261,6 +268,8 @@ std::optional<FolderDamage> ModelRunner::renewIfDamaged(int slot, std::vector<st
 std::optional<FolderDamage> ModelRunner::removeResults(const SlotFiles& files) {
   std::vector<std::string> results = files.output.simulationFiles;
   if (!files.output.measureFile.empty()) results.push_back(files.output.measureFile);
+  const std::vector<std::string>& further = files.output.furtherMeasureFiles;
+  results.insert(results.end(), further.begin(), further.end());
   for (const std::string& path : results) {
     const int error = errorOfRemoval(path);
     if (isDoneByModel(error)) return FolderDamage{"Unable to remove " + path, std::strerror(error)};

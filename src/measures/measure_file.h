@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <memory>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -10,6 +11,13 @@ namespace mirevo {
 
 class InstructionFile;
 class ReadingWatch;
+
+/// An output-measure file behind the first one; file names are absolute.
+struct MeasureFileSource {
+  std::string fileName;
+  std::string instructionFile;
+  std::shared_ptr<const InstructionFile> instructions = {};  ///< its content: where the numbers are
+};
 
 /// What a model wrote to an output-measure file.
 struct MeasureFile {

@@ -65,7 +65,10 @@ struct OutputMeasure {
   std::string name;
   InterfaceType interfaceType = InterfaceType::timeSeries;
   std::int32_t measurementNo = 1;    ///< which number of the output-measure file, from 1
+  std::string measureFile = {};      ///< that has the number, if it is not the first one
   std::string measurementName = {};  ///< its name in the instruction file; empty: it is told by the number
+  /// With it a measure that the model wrote is the weighted difference of the number to this; empty: the number itself.
+  std::optional<double> observedValue = {};
   StatisticType statisticType = StatisticType::mean;
   ValueTransformation transformation = ValueTransformation::none;
   std::optional<double> epsilon;  ///< added to the values before a logarithm, inverse or power; empty: of the default
@@ -83,6 +86,13 @@ struct OutputMeasure {
   SeriesReference shownAbove = {};  ///< drawn above the hydrograph; without a file name: none
   std::string displayName = {};     ///< of the quantity, for people; empty: the name of the observed item
   std::string unit = {};            ///< of the values; empty: as the observed file says
+
+  /// Of a number that the model wrote, the value of the measure.
+  double valueOf(double number) const {
+    if (!observedValue) return number;
+    const double difference = number - *observedValue;
+    return (difference > 0.0 ? weightAbove : weight) * difference;
+  }
 };
 
 /// Values of series in 32 bits, as the statistics of a run use them, or with all digits of their file.

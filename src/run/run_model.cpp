@@ -22,6 +22,7 @@ ModelDescription describeModel(const RunConfig& config) {
   model.measures = withItemNumbers(config.measures);
   if (config.readsMeasureFile()) model.measureFile = config.measureFile;
   model.instructions = config.instructions;
+  if (config.readsMeasureFile()) model.furtherMeasureFiles = config.furtherMeasureFiles;
   model.period = config.period;
   model.validationPeriods = config.validationPeriods;
   model.minimumCoverage = config.minimumCoverage;

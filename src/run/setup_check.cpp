@@ -115,7 +115,7 @@ void SetupCheck::judgeRun(ModelRunner& runner, ProcessLauncher& launcher, std::s
 }
 
 EvaluationResult SetupCheck::resultOf(ModelRunner& runner, ProcessLauncher& launcher, std::span<const double> set) {
-  if (auto failure = runner.prepareModelRun(set, 1)) return runner.failedResult(std::move(*failure));
+  if (auto failure = runner.prepareModelRun(set, 1, 1)) return runner.failedResult(std::move(*failure));
   for (std::int32_t executing = 1, status = 0; executing != 0;) {
     launcher.isExecuting(1, executing, status);
     if (executing != 0) launcher.waitForChange(kPollSeconds);

@@ -151,6 +151,32 @@ TEST_F(ModelRunTest, InstructionsThatAListingDoesNotFitOrThatCutItsNumbersAreWar
   EXPECT_THAT(evaluate(2.0).warnings, ElementsAre());
 }
 
+TEST_F(ModelRunTest, SeveralListingsGiveOneListOfNumbersAndDifferencesToObservedValues) {
+  std::string reason;
+  const auto read = [&reason](const char* text) {
+    return std::make_shared<const InstructionFile>(InstructionFile::parse("i.ins", text, reason).value());
+  };
+  description_.measures[0].interfaceType = InterfaceType::measureFile;
+  description_.measures[0].measurementNo = 3;
+  description_.measures[0].observedValue = 4.0;
+  description_.measures[0].weight = 10.0;
+  description_.measures[0].weightAbove = 100.0;
+  description_.measureFile = folder_ / "base/out/a.txt";
+  description_.instructions = read("pif ~\nl1 !a! !b!\n");
+  description_.furtherMeasureFiles = {{folder_ / "base/out/b.txt", "", read("pif ~\nl1 !c!\n")}};
+  folder_.write("base/out/keep", "");
+  makeRunner(launcher_, 1);
+  for (const auto& [number, measure] : {std::pair("3", -10.0), {"4.5", 50.0}, {"4", 0.0}}) {
+    batch_.write = [this, number = number](const std::string& folder) {
+      std::ofstream(folder + "/out/a.txt") << "1 2\n";
+      std::ofstream(folder + "/out/b.txt") << number << "\n";
+    };
+    EXPECT_THAT(evaluate(2.0).measureValues, ElementsAre(measure)) << number;
+  }
+  batch_.write = [](const std::string& folder) { std::ofstream(folder + "/out/a.txt") << "1 2\n"; };
+  EXPECT_THAT(evaluate(2.0).failure.value().reason, HasSubstr("did not write"));
+}
+
 TEST_F(ModelRunTest, MeasureFileValuesAreTakenByTheirNumber) {
   description_.measures[0].interfaceType = InterfaceType::measureFile;
   description_.measures[0].measurementNo = 2;

@@ -198,6 +198,12 @@ const SectionRow& listSection(std::string_view path) {
                              "Periods in which the measures that compare series are computed as well, for every "
                              "evaluation, without bearing on the objective functions or the search.",
                              {itemCount(0)}});
+    constexpr std::string_view kFurther = "ObjectiveFunctions/OUTPUT_MEASURES/FURTHER_FILES";
+    lists.emplace(kFurther, SectionRow{kFurther,
+                                       "if the setup has it",
+                                       "Output-measure files behind the one of `OUTPUT_MEASURE_FILE`, which then has "
+                                       "an `Instruction_File`, too.",
+                                       {itemCount(0)}});
     return lists;
   }();
   return rows.at(path);
@@ -439,6 +445,11 @@ const SettingSection<OutputMeasure>& measureSection() {
                                             .defaultValue = "''",
                                             .meaning = "The name of the number in the instruction file of the "
                                                        "output-measure file, in place of its number."}),
+        setting<&Measure::observedValue>(
+            {.name = "Observed_Value",
+             .defaultValue = "none",
+             .meaning = "With interface type 1: the measure is the difference of the model's number to this, times "
+                        "`Weight` or, if it is above 0, `Weight_Above`. Without it, the number itself."}),
         choice<Measure>(
             [](Measure& measure, const SetupValue& value) {
               const auto* code = std::get_if<std::int32_t>(&value);
@@ -642,7 +653,7 @@ const SettingSection<RunConfig>& measureFileSection() {
   static const SettingSection<RunConfig> section{
       {"ObjectiveFunctions/OUTPUT_MEASURES/OUTPUT_MEASURE_FILE",
        "always",
-       "The file from which measures of interface type 1 take their numbers.",
+       "The file from which measures of interface type 1 take their numbers, and the first of several.",
        {setting<&RunConfig::measureFile>(
             {.name = "File_Name",
              .type = KeywordType::fileName,
@@ -655,6 +666,21 @@ const SettingSection<RunConfig>& measureFileSection() {
              .defaultValue = "''",
              .meaning = "A file (`pif`) that says where in the output-measure file the numbers are. Without it, the "
                         "file has numbers alone. Read if a measure has interface type 1."})}}};
+  return section;
+}
+
+const SettingSection<MeasureFileSource>& furtherMeasureFileSection() {
+  static const SettingSection<MeasureFileSource> section{
+      {"ObjectiveFunctions/OUTPUT_MEASURES/FURTHER_FILES/FURTHER_FILE_n",
+       "for each item",
+       "A file that the model writes, or another reading of one. Its numbers are counted on behind those of the files "
+       "before it, and its names differ from theirs.",
+       {setting<&MeasureFileSource::fileName>(
+            {.name = "File_Name", .type = KeywordType::fileName, .meaning = "In or below the base folder."}),
+        setting<&MeasureFileSource::instructionFile>(
+            {.name = "Instruction_File",
+             .type = KeywordType::fileName,
+             .meaning = "A file (`pif`) that says where in the file the numbers are."})}}};
   return section;
 }
 

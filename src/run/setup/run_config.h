@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "measures/instruction_file.h"
+#include "measures/measure_file.h"
 #include "measures/objective_functions.h"
 #include "measures/output_measure.h"
 #include "measures/validation_period.h"
@@ -52,6 +53,7 @@ struct RunConfig {
   std::string measureFile;                              ///< may be given though no measure reads it
   std::string instructionFile;                          ///< where its numbers are; empty: in free format
   std::shared_ptr<const InstructionFile> instructions;  ///< its content
+  std::vector<MeasureFileSource> furtherMeasureFiles;   ///< behind the first one
   std::vector<ObjectiveFunction> objectives;
   std::vector<SavedOutputFile> savedOutputFiles;
 

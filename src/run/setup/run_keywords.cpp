@@ -186,7 +186,9 @@ const SetupSchema& setupSchema() {
       const auto sections = task->sections();
       rows.insert(rows.end(), sections.begin(), sections.end());
     }
-    rows.insert(rows.end(), {&slotsSection().row, &measureFileSection().row, &reservedSection()});
+    rows.insert(rows.end(), {&slotsSection().row, &measureFileSection().row,
+                             &listSection("ObjectiveFunctions/OUTPUT_MEASURES/FURTHER_FILES"),
+                             &furtherMeasureFileSection().row, &reservedSection()});
     return SetupSchema(std::move(rows));
   }();
   return schema;

@@ -114,11 +114,23 @@ class SetupReader final {
   void readSimultaneousSimulations();
   void readMeasureFile();
   void readInstructions(const SetupSection& section);
+  static std::shared_ptr<const InstructionFile> openInstructions(const SetupSection& section, const std::string& file);
+  void readFurtherMeasureFiles(const SetupSection& section);
+  void gatherMeasurements(const SetupSection& section);
   void findMeasurement(const SetupSection& section, OutputMeasure& measure) const;
   void requireScales(bool hasInitialSample) const;
 
+  /// The numbers that instructions read.
+  struct Measurements {
+    std::vector<std::string> names;
+    std::unordered_map<std::string, std::size_t> places;  ///< by name in lower case
+    std::vector<std::size_t> ends;                        ///< of the files, in `names`
+    std::string files;                                    ///< of instructions, for messages
+  };
+
   SetupFile& file_;
   SetupSection target_;
+  Measurements measurements_;
   RunConfig config_;
   SectionsRead sections_;
   std::optional<EquationCheck> equations_;  ///< over the parameters, once they are read
@@ -476,21 +488,65 @@ void SetupReader::readMeasureFile() {
   readInstructions(section);
 }
 
-/// Where the numbers of the output-measure file are, and the numbers of the measures that name them.
+std::shared_ptr<const InstructionFile> SetupReader::openInstructions(const SetupSection& section,
+                                                                     const std::string& file) {
+  std::string reason;
+  const auto text = readTextFile(file, reason);
+  if (!text) {
+    section.refuse("Error: Unable to open instruction file", "Instruction_File", fmt::format("{}: {}", file, reason));
+  }
+  auto instructions = InstructionFile::parse(file, *text, reason);
+  if (!instructions) section.refuse("Error: Invalid instruction file", "Instruction_File", reason);
+  return std::make_shared<const InstructionFile>(*std::move(instructions));
+}
+
+/// The output-measure files behind the one of `section`.
+void SetupReader::readFurtherMeasureFiles(const SetupSection& section) {
+  const auto list = target_.open("ObjectiveFunctions").open("OUTPUT_MEASURES").openIfPresent("FURTHER_FILES");
+  if (!list) return;
+  list->readItems("FURTHER_FILE_", furtherMeasureFileSection(), config_.furtherMeasureFiles,
+                  [this](const SetupSection& opened, MeasureFileSource& file) {
+                    if (file.fileName.empty()) {
+                      opened.refuse("Error: File containing output measures not defined", "File_Name",
+                                    "expected the name of a file");
+                    }
+                    validateInBaseFolder(file.fileName, config_.baseFolder, "File_Name", opened);
+                    file.instructions = openInstructions(opened, file.instructionFile);
+                  });
+  if (config_.furtherMeasureFiles.empty()) return;
+  if (!config_.instructions) {
+    section.refuse("Error: Instruction file of the output-measure file not defined", "Instruction_File",
+                   "expected the name of a file, since there are FURTHER_FILES, whose numbers are counted on from its");
+  }
+}
+
+/// Names of all output-measure files: each tells one number of them.
+void SetupReader::gatherMeasurements(const SetupSection& section) {
+  const auto gather = [&](const InstructionFile& instructions, const std::string& file) {
+    for (const std::string& name : instructions.names()) {
+      if (!measurements_.places.emplace(toLowerAscii(name), measurements_.names.size()).second) {
+        section.refuse("Error: Invalid instruction file", "Instruction_File",
+                       fmt::format("expected a name in {} that is not in {}, found {}", file, measurements_.files,
+                                   quotedForMessage(name)));
+      }
+      measurements_.names.push_back(name);
+    }
+    measurements_.ends.push_back(measurements_.names.size());
+    measurements_.files += (measurements_.files.empty() ? "" : ", ") + file;
+  };
+  if (config_.instructions) gather(*config_.instructions, config_.instructionFile);
+  for (const MeasureFileSource& file : config_.furtherMeasureFiles) gather(*file.instructions, file.instructionFile);
+}
+
+/// Where the numbers of the output-measure files are, and the numbers of the measures that name them.
 void SetupReader::readInstructions(const SetupSection& section) {
   if (!config_.instructionFile.empty() && !config_.readsMeasureFile()) {
     section.warn("Instruction_File", "not read, as no output measure has Interface_Type = 1");
   } else if (!config_.instructionFile.empty()) {
-    std::string reason;
-    const auto text = readTextFile(config_.instructionFile, reason);
-    if (!text) {
-      section.refuse("Error: Unable to open instruction file", "Instruction_File",
-                     fmt::format("{}: {}", config_.instructionFile, reason));
-    }
-    auto instructions = InstructionFile::parse(config_.instructionFile, *text, reason);
-    if (!instructions) section.refuse("Error: Invalid instruction file", "Instruction_File", reason);
-    config_.instructions = std::make_shared<const InstructionFile>(*std::move(instructions));
+    config_.instructions = openInstructions(section, config_.instructionFile);
   }
+  if (config_.readsMeasureFile()) readFurtherMeasureFiles(section);
+  gatherMeasurements(section);
   for (std::size_t i = 0; i < config_.measures.size(); ++i) {
     OutputMeasure& measure = config_.measures[i];
     if (measure.interfaceType == InterfaceType::measureFile) {
@@ -501,7 +557,7 @@ void SetupReader::readInstructions(const SetupSection& section) {
   }
 }
 
-/// Which number of the output-measure file a measure is.
+/// Which number of the output-measure files a measure is.
 void SetupReader::findMeasurement(const SetupSection& section, OutputMeasure& measure) const {
   const std::string message = "Error: Measurement No. invalid for output measure " + measure.name;
   const InstructionFile* const instructions = config_.instructions.get();
@@ -511,24 +567,31 @@ void SetupReader::findMeasurement(const SetupSection& section, OutputMeasure& me
     section.refuse(message, "Measurement_Name",
                    "expected MeasurementNo, or Instruction_File in OUTPUT_MEASURE_FILE, of which this would be a name");
   }
-  const std::vector<std::string>& names = instructions->names();
+  const std::vector<std::string>& names = measurements_.names;
+  const std::string& files = measurements_.files;
   if (name.empty()) {
-    if (static_cast<std::size_t>(measure.measurementNo) <= names.size()) return;
-    section.refuse(message, "MeasurementNo",
-                   fmt::format("expected 1 to {}, since so many numbers are read by {}, found {}", names.size(),
-                               config_.instructionFile, measure.measurementNo));
+    if (static_cast<std::size_t>(measure.measurementNo) > names.size()) {
+      section.refuse(message, "MeasurementNo",
+                     fmt::format("expected 1 to {}, since so many numbers are read by {}, found {}", names.size(),
+                                 files, measure.measurementNo));
+    }
+  } else {
+    if (section.isWritten("MeasurementNo")) {
+      section.refuse(message, "Measurement_Name", "expected this or MeasurementNo, found both");
+    }
+    const auto place = measurements_.places.find(toLowerAscii(name));
+    if (place == measurements_.places.end()) {
+      const auto nearest = nearestName(name, names);
+      section.refuse(message, "Measurement_Name",
+                     fmt::format("expected a name in {}, found {}{}", files, quotedForMessage(name),
+                                 nearest ? fmt::format(", did you mean {}?", *nearest) : ""));
+    }
+    measure.measurementNo = static_cast<std::int32_t>(place->second) + 1;
   }
-  if (section.isWritten("MeasurementNo")) {
-    section.refuse(message, "Measurement_Name", "expected this or MeasurementNo, found both");
-  }
-  const auto place = instructions->placeOf(name);
-  if (!place) {
-    const auto nearest = nearestName(name, names);
-    section.refuse(message, "Measurement_Name",
-                   fmt::format("expected a name in {}, found {}{}", config_.instructionFile, quotedForMessage(name),
-                               nearest ? fmt::format(", did you mean {}?", *nearest) : ""));
-  }
-  measure.measurementNo = static_cast<std::int32_t>(*place) + 1;
+  const auto number = static_cast<std::size_t>(measure.measurementNo);
+  const auto file = static_cast<std::size_t>(
+      std::lower_bound(measurements_.ends.begin(), measurements_.ends.end(), number) - measurements_.ends.begin());
+  if (file > 0) measure.measureFile = config_.furtherMeasureFiles[file - 1].fileName;
 }
 
 }  // namespace

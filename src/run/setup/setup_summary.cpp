@@ -104,7 +104,11 @@ class Summary final {
 }  // namespace
 
 std::string statisticName(const OutputMeasure& measure) {
-  if (measure.interfaceType == InterfaceType::measureFile) return "written by the model";
+  if (measure.interfaceType == InterfaceType::measureFile) {
+    return measure.observedValue
+               ? fmt::format("weighted difference of the model's number to {}", formatReal(*measure.observedValue))
+               : "written by the model";
+  }
   return describeStatistic(measure);
 }
 

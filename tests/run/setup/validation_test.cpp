@@ -173,6 +173,14 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
        "Measurement No. invalid for output measure Written", "two.ins, found \"Head_3\", did you mean head_1?"},
       {instructed + " & MeasurementNo = 3 => Measurement_Name = 'head_2'\nMeasurementNo = 2",
        "Measurement No. invalid for output measure Written", "expected this or MeasurementNo, found both"},
+      {instructed + " & [OUTPUT_MEASURE_FILE] => [FURTHER_FILES]\nTqSEKdxListItemCount = 1\n[FURTHER_FILE_1]\n"
+                    "File_Name = 'model/b.txt'\nInstruction_File = 'two.ins'\n[/FURTHER_FILE_1]\n[/FURTHER_FILES]\n"
+                    "[OUTPUT_MEASURE_FILE]",
+       "Invalid instruction file", "two.ins, found \"head_1\""},
+      {"[OUTPUT_MEASURE_FILE] => [FURTHER_FILES]\nTqSEKdxListItemCount = 1\n[FURTHER_FILE_1]\n"
+       "File_Name = 'model/b.txt'\nInstruction_File = 'two.ins'\n[/FURTHER_FILE_1]\n[/FURTHER_FILES]\n"
+       "[OUTPUT_MEASURE_FILE]",
+       "Instruction file of the output-measure file not defined", "since there are FURTHER_FILES"},
       {"MeasurementNo = 3 => Measurement_Name = 'head_2'", "Measurement No. invalid for output measure Written",
        "or Instruction_File in OUTPUT_MEASURE_FILE"},
       {listed + "'none.ins'\nInstruction_Dates = 'YYYYMM'", "Invalid instruction file",
