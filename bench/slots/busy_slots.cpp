@@ -5,8 +5,11 @@
 //   busy_slots [CASE]...        the cases to measure, by the beginning of their names; all without one
 //
 // A case is measured with run times that are exponentially distributed and, where it says so, with equal ones. Run
-// times depend on the parameters alone, so that a case makes the same model runs every time.
+// times depend on the parameters alone, so that a case makes the same model runs every time. Another program can be
+// measured, in MIREVO_PROGRAM. The case "output" is of models of 0.5 s that write much, one number of slots after the
+// other; TMPDIR=/dev/shm keeps the disk out of it.
 #include <algorithm>
+#include <cstdlib>
 #include <filesystem>
 #include <fstream>
 #include <future>
@@ -31,6 +34,7 @@ struct Case {
   std::string task;  ///< the sections of the setup that say what is run
   int runs = kRuns;
   int option = 2;
+  int rows = 0;  ///< that a model run writes; 0: a few
 };
 
 std::string search(const std::string& algorithm, const std::string& settings) {
@@ -108,7 +112,8 @@ void writeModel(const std::filesystem::path& folder) {
 }
 
 void run(const std::string& setup) {
-  std::string program = MIREVO_PROGRAM;
+  const char* const other = std::getenv("MIREVO_PROGRAM");
+  std::string program = other == nullptr ? MIREVO_PROGRAM : other;
   std::string argument = setup;
   char* const arguments[] = {program.data(), argument.data(), nullptr};
   pid_t process = 0;
@@ -126,7 +131,8 @@ double measure(const std::filesystem::path& folder, const Case& measured, int sl
   writeModel(folder);
   const std::string log = folder / "runs";
   const std::string setup = folder / "busy.kdx";
-  std::ofstream(setup) << setupText(measured, slots, fmt::format("{} {} {}", times, meanSeconds, log));
+  const std::string rows = measured.rows > 0 ? fmt::format(" {}", measured.rows) : "";
+  std::ofstream(setup) << setupText(measured, slots, fmt::format("{} {} {}{}", times, meanSeconds, log, rows));
   run(setup);
   std::vector<std::pair<double, double>> runs;  // start and end
   std::ifstream file(log);
@@ -145,6 +151,26 @@ double measure(const std::filesystem::path& folder, const Case& measured, int sl
 
 bool isWanted(const std::string& name, const std::vector<std::string>& wanted) {
   return wanted.empty() || std::ranges::any_of(wanted, [&](const std::string& each) { return name.starts_with(each); });
+}
+
+void measureLargeOutput(const std::filesystem::path& folder, const std::vector<std::string>& wanted) {
+  constexpr double kSeconds = 0.5;
+  constexpr int kRounds = 16;
+  constexpr std::pair<int, int> kSizes[] = {{0, 0}, {1, 40'000}, {12, 480'000}, {60, 2'400'000}};  // MB and rows
+  fmt::print("\nModel runs of {} s, {} for each slot, that write so much\n\n", kSeconds, kRounds);
+  fmt::print("| | 4 slots | 16 slots |\n|---|---|---|\n");
+  for (const auto& [megabytes, rows] : kSizes) {
+    const std::string name = fmt::format("output {} MB", megabytes);
+    if (!isWanted(name, wanted)) continue;
+    fmt::print("| {} |", name);
+    for (const int slots : {4, 16}) {
+      Case measured = uncertainty(kRounds * slots);
+      measured.rows = rows;
+      fmt::print(" {:.2f} |", measure(folder, measured, slots, "equal", kSeconds));
+      std::fflush(stdout);
+    }
+    fmt::print("\n");
+  }
 }
 
 }  // namespace
@@ -173,6 +199,7 @@ int main(int argc, char** argv) {
       fmt::print("\n");
       std::fflush(stdout);
     }
+    measureLargeOutput(folder / "output", wanted);
   } catch (const std::exception& error) {
     fmt::print(stderr, "{}\n", error.what());
     return 1;

@@ -351,6 +351,10 @@ ReadingWatch& SeriesTables::watch() {
   return reading_->watch;
 }
 
+void SeriesTables::endHelper() {
+  reading_->netcdf.end();
+}
+
 void SeriesTables::releaseSimulationFiles() {
   simulations_.clear();
 }

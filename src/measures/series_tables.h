@@ -45,6 +45,8 @@ class SeriesTables final {
   void releaseSimulationFiles();
   /// Limits how long files are read.
   ReadingWatch& watch();
+  /// Ends the process that reads files of some formats, if there is one.
+  void endHelper();
 
   const std::vector<std::string>& observationFileNames() const { return observationNames_; }
   const std::vector<std::string>& simulationFileNames() const { return simulationNames_; }
