@@ -177,7 +177,8 @@ int setupPage(std::string_view version) {
       fmt::print(".PP\n");
     }
   }
-  fmt::print(".SH SEE ALSO\n.BR Mirevo (1),\n.BR mirevo\\-viewer (1),\n.BR mirevo\\-report (1)\n");
+  fmt::print(
+      ".SH SEE ALSO\n.BR Mirevo (1),\n.BR mirevo\\-viewer (1),\n.BR mirevo\\-report (1),\n.BR mirevo\\-import (1)\n");
   return 0;
 }
 
@@ -225,7 +226,7 @@ int programPage(std::string_view version, std::string_view program, std::string_
   }
   fmt::print(".SH SYNOPSIS\n{}.SH DESCRIPTION\n{}.SH SEE ALSO\n", synopsis, description);
   std::string others;
-  for (const std::string_view other : {"Mirevo", "mirevo-viewer", "mirevo-report"}) {
+  for (const std::string_view other : {"Mirevo", "mirevo-viewer", "mirevo-report", "mirevo-import"}) {
     if (other != program) others += fmt::format(".BR {} (1),\n", plain(other));
   }
   fmt::print("{}.BR mirevo\\-setup (5)\n.PP\nThe manual is in the folder {} of the installation.\n", others,

@@ -14,7 +14,7 @@ standIn() {
   printf '#!/bin/sh\n%s\n' "$2" >"$stand/$1"
   chmod +x "$stand/$1"
 }
-standIn dpkg-query 'case "$*" in *libfmt-dev | *cppcheck) exit 1 ;; esac; echo "install ok installed"'
+standIn dpkg-query 'case "$*" in *libfmt-dev | *cppcheck | *slurmd) exit 1 ;; esac; echo "install ok installed"'
 standIn node ''
 standIn npm ''
 
@@ -34,6 +34,7 @@ standIn sudo 'exit 1'
 standIn apt-get 'echo "apt-get was run"; exit 100'
 expect 1000 1 "apt-get install --no-install-recommends libfmt-dev cppcheck"
 expect 1000 1 "apt-get install --no-install-recommends libfmt-dev" build
+expect 1000 1 "apt-get install --no-install-recommends slurmd" slurm
 expect 0 100 "apt-get was run" build
 standIn apt-get 'echo "apt-get was run"'
 expect 0 0 "Installing these and what they need: done" build

@@ -1,8 +1,10 @@
 // What grows with the size of a run: time, processor time, peak memory and files of the built program.
 //
-//   scale FIGURE [FOLDER]   FIGURE is one of the names that it prints without arguments; FOLDER is where a folder for
-//                           it is made (default: the temporary one)
+//   scale FIGURE [FOLDER [COUNT]]   FIGURE is one of the names that it prints without arguments; FOLDER is where a
+//                                   folder for it is made (default: the temporary one). COUNT: of `bands` the model
+//                                   runs, of `report` the measures of each series, of `sensitivity` the parameters
 #include <cstdio>
+#include <cstdlib>
 #include <filesystem>
 #include <string>
 #include <string_view>
@@ -19,7 +21,7 @@ namespace {
 
 using namespace mirevo::bench;
 
-void restart(const std::string& folder) {
+void restart(const std::string& folder, int /*count*/) {
   constexpr int kRows = 1'000'000;
   const std::string setup =
       writeSetup(folder, {.simulation = "Restart = 1\nReport = 0\n", .task = ddsSections(kRows + 10)});
@@ -27,7 +29,7 @@ void restart(const std::string& folder) {
   measureProgram("restart of 1,000,000 rows", setup);
 }
 
-void uncertainty(const std::string& folder) {
+void uncertainty(const std::string& folder, int /*count*/) {
   constexpr int kParameters = 10'000;
   const std::string setup = writeSetup(folder, {.option = 3,
                                                 .parameters = kParameters,
@@ -36,12 +38,13 @@ void uncertainty(const std::string& folder) {
   measureProgram("uncertainty of 10,000 parameters, 100 runs", setup);
 }
 
-/// 1,000 measures: 20 selections of the observations of each of 50 series of ten years of hourly values.
-void series(const std::string& folder) {
-  constexpr int kSeries = 50;
-  constexpr int kSelections = 20;
-  std::string measures = itemCount(kSeries * kSelections);
-  for (int i = 0; i < kSeries * kSelections; ++i) {
+constexpr int kSeries = 50;
+
+/// So many selections of the observations of each of 50 series of ten years of hourly values, by default 20, which are
+/// 1,000 measures.
+void measureSeries(const std::string& folder, int selections, int report) {
+  std::string measures = itemCount(kSeries * selections);
+  for (int i = 0; i < kSeries * selections; ++i) {
     const std::string item = fmt::format("Item_No = {}\n", i % kSeries + 1);
     measures += section(fmt::format("MEASURE_{}", i + 1),
                         {fmt::format("Name = 'm{}'\nStatistic_Type = 1\nFunction_Name = 'all'\n", i + 1),
@@ -49,33 +52,84 @@ void series(const std::string& folder) {
                          section("SIMULATION_FILE", {"File_Name = 'base/simulated.csv'\n", item}),
                          section("OBSERVATION_FILE", {"File_Name = 'observed.csv'\n", item})});
   }
-  const std::string setup = writeSetup(folder, {.simulation = "Report = 0\n",
+  const std::string setup = writeSetup(folder, {.simulation = fmt::format("Report = {}\n", report),
                                                 .measures = measures,
                                                 .task = ddsSections(4),
                                                 .model = "cat input.csv > simulated.csv\n"});
   for (const std::string file : {"/base/input.csv", "/base/simulated.csv", "/observed.csv"}) {
     writeHourlySeries(folder + file, kSeries);
   }
-  measureProgram("1,000 measures over 50 series of 87,600 rows, 5 runs, Report = 0", setup);
+  measureProgram(fmt::format("{} measures over {} series of 87,600 rows, 5 runs, Report = {}", kSeries * selections,
+                             kSeries, report),
+                 setup);
 }
 
-void surrogate(const std::string& /*folder*/) {
+void series(const std::string& folder, int count) {
+  measureSeries(folder, count > 0 ? count : 20, 0);
+}
+void report(const std::string& folder, int count) {
+  measureSeries(folder, count > 0 ? count : 20, 1);
+}
+
+/// An uncertainty analysis of a series of 87,600 values, of which a band is made, with a model that answers at once.
+void bands(const std::string& folder, int count) {
+  const int runs = count > 0 ? count : 1000;
+  const std::string measure =
+      itemCount(1) +
+      section("MEASURE_1", {"Name = 'm'\nStatistic_Type = 1\nFunction_Name = 'all'\n",
+                            section("SIMULATION_FILE", {"File_Name = 'base/simulated.csv'\nItem_No = 1\n"}),
+                            section("OBSERVATION_FILE", {"File_Name = 'observed.csv'\nItem_No = 1\n"})});
+  const std::string setup = writeSetup(folder, {.option = 3,
+                                                .simulation = "Report = 0\n",
+                                                .measures = measure,
+                                                .task = uncertaintySections(runs, 4),
+                                                .model = "cat input.csv > simulated.csv\n"});
+  for (const std::string file : {"/base/input.csv", "/base/simulated.csv", "/observed.csv"}) {
+    writeHourlySeries(folder + file, 1);
+  }
+  measureProgram(fmt::format("uncertainty of 4 parameters, {} runs of 87,600 values", runs), setup);
+}
+
+/// A sensitivity analysis with covariance: every value depends on two of the parameters.
+void sensitivity(const std::string& folder, int count) {
+  const int parameters = count > 0 ? count : 2000;
+  const std::string measure =
+      itemCount(1) +
+      section("MEASURE_1", {"Name = 'm'\nStatistic_Type = 1\nFunction_Name = 'all'\n",
+                            section("SIMULATION_FILE", {"File_Name = 'base/simulated.csv'\nItem_No = 1\n"}),
+                            section("OBSERVATION_FILE", {"File_Name = 'observed.csv'\nItem_No = 1\n"})});
+  const std::string setup = writeSetup(
+      folder, {.option = 1,
+               .parameters = parameters,
+               .simulation = "Report = 0\n",
+               .measures = measure,
+               .task = section("SENSITIVITY_ANALYSIS",
+                               {"Sensitivity_Type = 0\n",
+                                section("LOCAL_SA", {"Perturbation_Fraction = 0.01\nCalculate_Covmatrix = 1\n"})}),
+               .model = "awk -F, 'NR == FNR { p[FNR] = $1; n = FNR; next } FNR == 1 { print; next } "
+                        "{ print $1 \",\" p[FNR % n + 1] * (1 + FNR % 7) + p[FNR * FNR % n + 1] }' "
+                        "parameters.txt input.csv > simulated.csv\n"});
+  for (const std::string file : {"/base/input.csv", "/base/simulated.csv", "/observed.csv"}) {
+    writeHourlySeries(folder + file, 1, 5000);
+  }
+  measureProgram(fmt::format("sensitivity analysis with covariance of {} parameters, 5,000 values", parameters), setup);
+}
+
+void surrogate(const std::string& /*folder*/, int /*count*/) {
   measureQuadraticSurrogate();
 }
-void covariance(const std::string& /*folder*/) {
+void covariance(const std::string& /*folder*/, int /*count*/) {
   measureCovariance();
 }
 
 struct Figure {
   std::string_view name;
-  void (*measure)(const std::string& folder);
+  void (*measure)(const std::string& folder, int count);
 };
 
-constexpr Figure kFigures[] = {{"restart", restart},
-                               {"uncertainty", uncertainty},
-                               {"series", series},
-                               {"surrogate", surrogate},
-                               {"covariance", covariance}};
+constexpr Figure kFigures[] = {
+    {"restart", restart}, {"uncertainty", uncertainty}, {"series", series},       {"report", report},
+    {"bands", bands},     {"sensitivity", sensitivity}, {"surrogate", surrogate}, {"covariance", covariance}};
 
 }  // namespace
 
@@ -88,7 +142,7 @@ int main(int argc, char** argv) {
     const std::string folder = (parent / fmt::format("mirevo_scale_{}", ::getpid())).string();
     int code = 0;
     try {
-      figure.measure(folder);
+      figure.measure(folder, argc > 3 ? std::atoi(argv[3]) : 0);
     } catch (const mirevo::FatalError& error) {
       fmt::print(stderr, "{}\n{}\n", error.message(), error.detail());
       code = 1;

@@ -93,13 +93,12 @@ std::string writeSetup(const std::string& folder, const ScaleSetup& setup) {
   return path;
 }
 
-void writeHourlySeries(const std::string& path, int series) {
-  constexpr int kRows = 87'600;
+void writeHourlySeries(const std::string& path, int series, int rows) {
   std::ofstream file(path);
   file << "time";
   for (int i = 1; i <= series; ++i) file << ",s" << i;
   const auto start = std::chrono::sys_days(std::chrono::January / 1 / 2001);
-  for (int row = 0; row < kRows; ++row) {
+  for (int row = 0; row < rows; ++row) {
     const std::chrono::year_month_day day = start + std::chrono::days(row / 24);
     std::string line = fmt::format("\n{:04}-{:02}-{:02} {:02}:00", static_cast<int>(day.year()),
                                    static_cast<unsigned>(day.month()), static_cast<unsigned>(day.day()), row % 24);

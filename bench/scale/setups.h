@@ -25,8 +25,8 @@ std::string itemCount(int count);
 /// Writes the model into `folder`/base and the setup into `folder`/scale.kdx, whose path it returns.
 std::string writeSetup(const std::string& folder, const ScaleSetup& setup);
 
-/// A CSV file of 87,600 hourly values from 2001 on.
-void writeHourlySeries(const std::string& path, int series);
+/// A CSV file of hourly values from 2001 on, 87,600 of them unless it says otherwise.
+void writeHourlySeries(const std::string& path, int series, int rows = 87'600);
 
 /// A search by DDS with this budget.
 std::string ddsSections(int budget);

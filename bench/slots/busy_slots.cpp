@@ -3,10 +3,11 @@
 // parameters.
 //
 //   busy_slots [CASE]...        the cases to measure, by the beginning of their names; all without one
+//   MIREVO=PROGRAM busy_slots   with another program than the one that was built
 //
-// A case is measured with run times that are exponentially distributed and, where it says so, with equal ones. Run
-// times depend on the parameters alone, so that a case makes the same model runs every time. Another program can be
-// measured, in MIREVO_PROGRAM. The case "output" is of models of 0.5 s that write much, one number of slots after the
+// A case is measured with run times that are exponentially distributed, whatever the parameters are, with times that
+// grow with three parameters, and with equal ones. Run times depend on the parameters alone, so that a case makes the
+// same model runs every time. The case "output" is of models of 0.5 s that write much, one number of slots after the
 // other; TMPDIR=/dev/shm keeps the disk out of it.
 #include <algorithm>
 #include <cstdlib>
@@ -62,7 +63,7 @@ Case opse(int setsInFlight) {
 Case uncertainty(int runs) {
   std::string text = fmt::format("[UNCERTAINTY_ESTIMATION]\nUncertainty_Type = 1\nSample_Size = {}\n", runs);
   for (int j = 1; j <= kParameters; ++j) {
-    text += fmt::format("[PARAMETER_{0}]\nMean_Value = 0.0\nStandard_Deviation = 1.0\n[/PARAMETER_{0}]\n", j);
+    text += fmt::format("[PARAMETER_{0}]\nMean_Value = 5.0\nStandard_Deviation = 12.0\n[/PARAMETER_{0}]\n", j);
   }
   return {fmt::format("uncertainty {}", runs), text + "[/UNCERTAINTY_ESTIMATION]\n", runs, 3};
 }
@@ -112,8 +113,8 @@ void writeModel(const std::filesystem::path& folder) {
 }
 
 void run(const std::string& setup) {
-  const char* const other = std::getenv("MIREVO_PROGRAM");
-  std::string program = other == nullptr ? MIREVO_PROGRAM : other;
+  const char* const other = std::getenv("MIREVO");
+  std::string program = other != nullptr ? other : MIREVO_PROGRAM;
   std::string argument = setup;
   char* const arguments[] = {program.data(), argument.data(), nullptr};
   pid_t process = 0;
@@ -178,18 +179,19 @@ void measureLargeOutput(const std::filesystem::path& folder, const std::vector<s
 int main(int argc, char** argv) {
   const std::vector<std::string> wanted(argv + 1, argv + argc);
   const auto folder = std::filesystem::temp_directory_path() / fmt::format("mirevo_busy_slots_{}", ::getpid());
-  const std::vector<Case> cases{pse(),     opse(42),  opse(84),         opse(126),
-                                opse(168), opse(210), uncertainty(100), uncertainty(kRuns)};
+  const std::vector<Case> cases{pse(),     opse(42),         opse(84),         opse(126),         opse(168),
+                                opse(210), uncertainty(100), uncertainty(400), uncertainty(kRuns)};
   try {
     fmt::print("Share of the time that slots are busy; {} parameters, {} points, {} runs\n\n", kParameters, kPopulation,
                kRuns);
-    fmt::print("| | 8 slots, exponential | 8 slots, equal | 32 slots, exponential | 32 slots, equal |\n");
-    fmt::print("|---|---|---|---|---|\n");
+    fmt::print(
+        "| | 8 slots, exponential | 8 slots, by parameters | 8 slots, equal | 32 slots, exponential | "
+        "32 slots, by parameters | 32 slots, equal |\n|---|---|---|---|---|---|---|\n");
     for (const Case& measured : cases) {
       if (!isWanted(measured.name, wanted)) continue;
       std::vector<std::future<double>> columns;  // side by side: these models need no processor
       for (const auto& [slots, mean] : {std::pair{8, 0.5}, {32, 2.0}}) {
-        for (const std::string times : {"exponential", "equal"}) {
+        for (const std::string times : {"exponential", "smooth", "equal"}) {
           columns.push_back(std::async(std::launch::async, measure, folder / fmt::format("{}{}", times, slots),
                                        std::cref(measured), slots, times, mean));
         }

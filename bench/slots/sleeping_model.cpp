@@ -1,9 +1,12 @@
-// A model that sleeps: sleeping_model (equal|exponential) MEAN-SECONDS LOG [ROWS]
+// A model that sleeps: sleeping_model (equal|exponential|smooth) MEAN-SECONDS LOG [ROWS]
 //
 // It reads `parameters.txt`, one value a line, writes the value of a function of the parameters as the series
-// `simulated.csv`, and sleeps for the rest of its time. That depends on the parameters alone: the mean, or a time that
-// is exponentially distributed over different parameters. The series has three days, or so many rows of ten minutes. It
-// appends its start and end to the log, in seconds of the monotonic clock.
+// `simulated.csv`, and sleeps for the rest of its time. That depends on the parameters alone: the mean, a time that is
+// exponentially distributed over different parameters, as if they had nothing to do with it, or (smooth) one that grows
+// steadily with the first three of them, over about two orders of magnitude, as time steps and cell sizes make it. The
+// series has three days, or so many rows of ten minutes. It appends its start and end to the log, in seconds of the
+// monotonic clock.
+#include <algorithm>
 #include <bit>
 #include <chrono>
 #include <cmath>
@@ -46,6 +49,13 @@ double ackley(const std::vector<double>& parameters) {
   }
   const auto n = static_cast<double>(parameters.size());
   return 20.0 - 20.0 * std::exp(-0.2 * std::sqrt(squares / n)) + std::exp(1.0) - std::exp(cosines / n);
+}
+
+/// About 1 for parameters that are spread over [-20, 30].
+double growth(const std::vector<double>& parameters) {
+  double sum = 0.0;
+  for (std::size_t j = 0; j < 3 && j < parameters.size(); ++j) sum += (parameters[j] - 5.0) / 25.0;
+  return 0.6 * std::exp(std::clamp(sum, -3.0, 3.0));
 }
 
 void writeDays(double value) {
@@ -91,7 +101,10 @@ int main(int argc, char** argv) {
   if (parameters.empty()) return 2;
   const bool isEqual = std::string_view(argv[1]) == "equal";
   const double mean = std::atof(argv[2]);
-  const double seconds = isEqual ? mean : -mean * std::log(uniformOf(parameters));
+  const bool isSmooth = std::string_view(argv[1]) == "smooth";
+  const double seconds = isEqual    ? mean
+                         : isSmooth ? mean * growth(parameters)
+                                    : -mean * std::log(uniformOf(parameters));
   argc == 5 ? writeRows(ackley(parameters), std::atoi(argv[4])) : writeDays(ackley(parameters));
   std::this_thread::sleep_for(std::chrono::duration<double>(start + seconds - now()));
   char line[80];

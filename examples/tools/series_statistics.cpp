@@ -48,7 +48,7 @@ struct Item {
 };
 
 Item openItem(const std::string& fileName, int number) {
-  Item item{openTimeSeries(fileName), number};
+  Item item{openTimeSeries(SeriesReference{.fileName = fileName}), number};
   if (!item.series->startTime()) throw std::runtime_error(fileName + ": holds no time step");
   if (number < 1 || number > item.series->itemCount()) throw std::runtime_error(fileName + ": has no such item");
   if (!item.series->getData(number)) throw std::runtime_error(item.series->lastError());

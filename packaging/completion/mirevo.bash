@@ -1,4 +1,4 @@
-# Completion in bash of Mirevo, mirevo-viewer and mirevo-report: setup files, options, and keywords after --keyword.
+# Completion in bash of Mirevo, mirevo-viewer, mirevo-report and mirevo-import: their files, options, and keywords after --keyword.
 
 # The lines that a program prints for the options in "$2" and onwards; nothing if it does not know them.
 _mirevo_answer() {
@@ -38,11 +38,15 @@ _mirevo() {
     if [ -d "$file" ]; then
       COMPREPLY+=("$file/")
     else
-      case "$file" in *.[kK][dD][xX]) COMPREPLY+=("$file") ;; esac
+      case "${program##*/}:$file" in
+        mirevo-import:*.[pP][sS][tT] | mirevo-import:*.[tT][xX][tT]) COMPREPLY+=("$file") ;;
+        mirevo-import:*) ;;
+        *.[kK][dD][xX]) COMPREPLY+=("$file") ;;
+      esac
     fi
   done < <(compgen -f -- "$current")
   compopt -o filenames 2>/dev/null
   case "${COMPREPLY[*]}" in */) compopt -o nospace 2>/dev/null ;; esac
 }
 
-complete -F _mirevo Mirevo mirevo-viewer mirevo-report
+complete -F _mirevo Mirevo mirevo-viewer mirevo-report mirevo-import

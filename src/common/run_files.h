@@ -51,6 +51,8 @@ inline constexpr RunFile kSavedFolder{"_Saved", ""};
 /// These two stand beside the setup, or in the folder that it names for them.
 inline constexpr RunFile kFailedFolder{"_Failed", "", true};
 inline constexpr RunFile kProcessFolder{"_Process", "", true};
+/// That of a check of the setup, which may be made while a run of it is going on.
+inline constexpr RunFile kCheckFolder{"_Check_Process", "", true};
 
 /// What keeps a second run away (common/file_lock): from the files with the setup's name, and from the process folders,
 /// beside which it lies; the runs of a job share that.

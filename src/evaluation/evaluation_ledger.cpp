@@ -2,16 +2,22 @@
 
 #include <algorithm>
 #include <cstddef>
+#include <cstdint>
+#include <functional>
 #include <iterator>
+#include <unordered_map>
 #include <utility>
 
 #include <fmt/core.h>
 
-#include "common/clock.h"
 #include "common/progress_messages.h"
 
 namespace mirevo {
 namespace {
+
+/// So many sets for each slot are the last ones of a batch. The others are started in their order, so that those that
+/// a run has made when it is cut off are not the ones that take long: statistics of a sample would be biased.
+constexpr std::size_t kLastSetsPerSlot = 8;
 
 std::string completedText(const EvaluationResult& result) {
   std::string_view outcome = progress::kOk;
@@ -24,8 +30,9 @@ std::string completedText(const EvaluationResult& result) {
 
 }  // namespace
 
-void EvaluationLedger::open(std::span<const ParameterSet> sets, DispatchMode mode) {
+void EvaluationLedger::open(std::span<const ParameterSet> sets, DispatchMode mode, std::size_t slotCount) {
   const std::size_t first = endPlace();
+  slotCount_ = slotCount;
   sets_.insert(sets_.end(), sets.begin(), sets.end());
   results_.resize(sets_.size());
   isFinished_.resize(sets_.size(), false);
@@ -86,8 +93,14 @@ std::optional<std::size_t> EvaluationLedger::takeNext() {
 
 std::optional<std::size_t> EvaluationLedger::placeOfNext() {
   while (next_ < endPlace() && isFinished_[indexOf(next_)]) ++next_;
-  if (next_ == endPlace() && returned_.empty()) return std::nullopt;
+  if (next_ == endPlace() && returned_.empty() && longestFirst_.empty()) return std::nullopt;
   if (runningCount_ > 0 && runComparison_.isAwaited()) return std::nullopt;
+  if (slotCount_ > 1) orderLast();
+  if (returned_.empty() && !longestFirst_.empty()) {
+    const std::size_t longest = longestFirst_.back();
+    longestFirst_.pop_back();
+    return longest;
+  }
   // In their order: a result may wait for that of a set before it.
   if (returned_.empty() || (next_ < endPlace() && next_ < *returned_.begin())) return next_++;
   const std::size_t first = *returned_.begin();
@@ -130,13 +143,52 @@ std::vector<double> EvaluationLedger::repeatedMeasures(std::size_t place) const 
   return earlier_ == nullptr ? std::vector<double>() : earlier_->measuresOf(numberOf(place));
 }
 
-void EvaluationLedger::markInitiated(std::size_t place) {
-  observer_.message(progress::initiatedMessage(numberOf(place)));
-  if (slotUse_ != nullptr && !isFinalRun_) slotUse_->runStarted(runTimeClock());
+void EvaluationLedger::orderLast() {
+  // A result may wait for that of a set before it until the first successful run is known.
+  if (runComparison_.firstNumber() == 0 || runTimes_.count() < RunTimes::kFewest) return;
+  if (next_ < endPlace()) {
+    if (endPlace() - next_ > kLastSetsPerSlot * slotCount_) return;
+    for (; next_ < endPlace(); ++next_) {
+      if (!isFinished_[indexOf(next_)]) longestFirst_.push_back(next_);
+    }
+    orderedBy_ = 0;
+  }
+  // Again when there is more to judge by.
+  if (longestFirst_.size() < 2 || 2 * runTimes_.count() < 3 * orderedBy_) return;
+  orderedBy_ = runTimes_.count();
+  std::ranges::sort(longestFirst_);
+  if (const std::vector<RunTimes::Effect> effects = runTimes_.effects(); !effects.empty()) {
+    std::vector<std::pair<double, std::size_t>> expected;
+    for (const std::size_t place : longestFirst_) expected.emplace_back(-expectedLog(effects, set(place)), place);
+    std::ranges::sort(expected);
+    std::ranges::transform(expected, longestFirst_.begin(), [](const auto& each) { return each.second; });
+    keepOrderOfEqual(longestFirst_);
+  }
+  std::ranges::reverse(longestFirst_);
 }
 
-void EvaluationLedger::markEnded() {
-  if (slotUse_ != nullptr && !isFinalRun_) slotUse_->runEnded(runTimeClock());
+void EvaluationLedger::keepOrderOfEqual(std::vector<std::size_t>& places) const {
+  if (isFinalRun_ || !known_.isKnowing()) return;
+  std::unordered_map<std::uint64_t, std::vector<std::size_t>> equal;
+  for (const std::size_t place : places) equal[known_.hashOf(set(place))].push_back(place);
+  for (auto& [hash, group] : equal) std::ranges::sort(group, std::greater());
+  for (std::size_t& place : places) {
+    std::vector<std::size_t>& group = equal.at(known_.hashOf(set(place)));
+    place = group.back();
+    group.pop_back();
+  }
+}
+
+void EvaluationLedger::markInitiated(std::size_t place, double now) {
+  observer_.message(progress::initiatedMessage(numberOf(place)));
+  if (slotUse_ != nullptr && !isFinalRun_) slotUse_->runStarted(now);
+  startedAt_[place] = now;
+}
+
+void EvaluationLedger::markEnded(std::size_t place, double now, bool isLost) {
+  if (slotUse_ != nullptr && !isFinalRun_) slotUse_->runEnded(now);
+  const auto started = startedAt_.extract(place);
+  if (!started.empty() && !isLost && slotCount_ > 1) runTimes_.add(set(place), now - started.mapped());
 }
 
 void EvaluationLedger::finish(std::size_t place, EvaluationResult result, std::string_view leftBehind) {
@@ -261,6 +313,8 @@ std::vector<EvaluationResult> EvaluationLedger::close() {
   sets_ = {};
   isFinished_.clear();
   returned_.clear();
+  longestFirst_.clear();
+  startedAt_.clear();
   runAgain_.clear();
   repeats_.clear();
   known_.closeBatch();

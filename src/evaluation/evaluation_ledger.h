@@ -18,6 +18,7 @@
 #include "evaluation/failed_run_policy.h"
 #include "evaluation/known_results.h"
 #include "evaluation/run_comparison.h"
+#include "evaluation/run_times.h"
 #include "evaluation/slot_use.h"
 #include "measures/objective_functions.h"
 
@@ -43,11 +44,14 @@ class EvaluationLedger final {
   /// has evaluated get their results at once, unless `mode` requires their model runs; the model is run for the output
   /// files of those that are EarlierEvaluations::isRunAgain(). Throws FatalError when the failed-run limit is exceeded,
   /// and if an earlier evaluation was of another set. A batch, which end() closes, is opened when nothing is open; sets
-  /// that takeFirst() takes may be opened beside others.
-  void open(std::span<const ParameterSet> sets, DispatchMode mode);
+  /// that takeFirst() takes may be opened beside others. `slotCount`: of a batch, how many of its sets can be run side
+  /// by side, if takeNext() may take its last ones in another order than theirs.
+  void open(std::span<const ParameterSet> sets, DispatchMode mode, std::size_t slotCount = 1);
   /// The next set, in order, that has no result yet and is to be run; empty when all are taken, as long as a model run
   /// may become the first successful one, by which the next ones are judged, and when the run was cancelled. Sets that
-  /// have been run get their results on the way, and one that equals a set that is being run waits for it.
+  /// have been run get their results on the way, and one that equals a set that is being run waits for it. Of the last
+  /// sets of a batch those come first that are likely to take longest, so that no slot is left with one of them when
+  /// the others have nothing to do.
   std::optional<std::size_t> takeNext();
   /// Takes a set back that could not be run where it was to be; it is the next one again.
   void putBack(std::size_t place);
@@ -58,10 +62,10 @@ class EvaluationLedger final {
   static int numberOf(std::size_t place) { return static_cast<int>(place) + 1; }
   /// By what the model run of the set taken last is judged.
   RunStandard standard() const { return runComparison_.standard(); }
-  /// To be called when the model run of the set has started.
-  void markInitiated(std::size_t place);
-  /// To be called when it has ended, once for each of those.
-  void markEnded();
+  /// To be called when the model run of the set has started; `now`: runTimeClock().
+  void markInitiated(std::size_t place, double now);
+  /// To be called when it has ended, once for each of those; `isLost`: nobody knows when, or it was given up.
+  void markEnded(std::size_t place, double now, bool isLost = false);
   /// Whether the result of a set can be taken; if not, the first successful run must end first, whose set has been
   /// taken before. Makes it a failed one if it is cut off. To be called before finish().
   bool judge(std::size_t place, EvaluationResult& result) const {
@@ -95,6 +99,11 @@ class EvaluationLedger final {
   void tell(ComparisonFindings found);
   void replay(std::size_t place, EvaluationResult result);
   std::optional<std::size_t> placeOfNext();
+  /// Takes the sets that are left of a batch into `longestFirst_` as soon as there are few, and orders them.
+  void orderLast();
+  /// Of sets that are the same for the model the one with the smallest number comes first, whose result the others
+  /// have.
+  void keepOrderOfEqual(std::vector<std::size_t>& places) const;
   /// Whether the set's result is that of evaluation No. `original`, which it then has.
   bool repeat(std::size_t place, int original);
   void store(std::size_t place, EvaluationResult result);
@@ -124,10 +133,15 @@ class EvaluationLedger final {
   std::size_t next_ = 0;          ///< first set that was not taken
   /// Sets that were taken and put back, those that have waited for an equal one, and those of runAgain_.
   std::set<std::size_t> returned_;
-  std::set<std::size_t> runAgain_;  ///< sets that have a result, whose model is run for its output files alone
-  std::set<std::size_t> repeats_;   ///< open sets whose result is that of an earlier model run
-  std::size_t finishedCount_ = 0;   ///< open sets that have a result
-  std::size_t runningCount_ = 0;    ///< sets that were taken and have no result
+  std::size_t slotCount_ = 1;              ///< of open()
+  std::vector<std::size_t> longestFirst_;  ///< the last sets of a batch that were not taken, the next one at the end
+  std::size_t orderedBy_ = 0;              ///< model runs that were known when these were put in order
+  RunTimes runTimes_;
+  std::map<std::size_t, double> startedAt_;  ///< by place, of those that are running
+  std::set<std::size_t> runAgain_;           ///< sets that have a result, whose model is run for its output files alone
+  std::set<std::size_t> repeats_;            ///< open sets whose result is that of an earlier model run
+  std::size_t finishedCount_ = 0;            ///< open sets that have a result
+  std::size_t runningCount_ = 0;             ///< sets that were taken and have no result
   std::set<std::pair<int, std::size_t>> warnedOf_;  ///< evaluations and measures with unused observations
   std::map<std::size_t, std::size_t> fewestUsed_;   ///< by measure, the fewest observations used of which a warning was
                                                     ///< given

@@ -44,9 +44,12 @@ class KnownResults final {
   /// The aggregate of the objective functions at this point of the run.
   double aggregateOf(const EvaluationResult& result) const { return aggregator_->aggregate(result.objectiveValues); }
 
- private:
+  /// False: every set is run.
+  bool isKnowing() const { return aggregator_ != nullptr; }
+  /// The same for sets that are the same, and rarely for others.
   std::uint64_t hashOf(std::span<const double> set) const;
 
+ private:
   SearchSpace space_;
   const ObjectiveAggregator* aggregator_ = nullptr;  ///< null: nothing is known
   // By hash. Of two sets with the same hash one is run without need to wait, or waits without need; both are rare.

@@ -6,6 +6,7 @@
 
 #include <fmt/core.h>
 
+#include "common/clock.h"
 #include "common/fatal_error.h"
 
 namespace mirevo {
@@ -23,7 +24,7 @@ LocalEvaluator::LocalEvaluator(ModelRunner& runner, EvaluationObserver& observer
 std::vector<EvaluationResult> LocalEvaluator::evaluateParameterSets(std::span<const ParameterSet> sets,
                                                                     DispatchMode mode) {
   assert(!ledger_.isOpen());
-  ledger_.open(sets, mode);
+  ledger_.open(sets, mode, slots_.size());
   startInFreeSlots();
   while (!ledger_.isComplete()) goOn();
   return ledger_.end();
@@ -64,9 +65,9 @@ void LocalEvaluator::startNext(int slot) {
     stopIfCancelled();
     if (!isUsable(slot)) return ledger_.putBack(*place);
     runner_.setStandard(ledger_.standard());
-    auto failure = runner_.prepareModelRun(ledger_.set(*place), slot);
+    auto failure = runner_.prepareModelRun(ledger_.set(*place), slot, ledger_.numberOf(*place));
     if (!failure) {
-      ledger_.markInitiated(*place);
+      ledger_.markInitiated(*place, runTimeClock());
       slots_[static_cast<std::size_t>(slot - 1)].running.emplace().place = *place;
       return;
     }
@@ -76,7 +77,7 @@ void LocalEvaluator::startNext(int slot) {
 
 bool LocalEvaluator::isUsable(int slot) {
   std::vector<std::string> warnings;
-  const auto damage = runner_.renewIfDamaged(slot, warnings);
+  const auto damage = runner_.renewIfDamaged(slot, warnings, [this] { stopIfCancelled(); });
   for (const std::string& text : warnings) observer_.warning(text);
   if (!damage) return true;
   slots_[static_cast<std::size_t>(slot - 1)].isGivenUp = true;
@@ -114,7 +115,7 @@ bool LocalEvaluator::isRead(int slot, Running& running) {
     std::int32_t status = 0;
     runner_.launcher().isExecuting(slot, executing, status);
     if (executing != 0) return false;
-    ledger_.markEnded();
+    ledger_.markEnded(running.place, runTimeClock());
     running.hasEnded = true;
   }
   const auto look = [this] { stopIfCancelled(); };

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <algorithm>
 #include <memory>
 #include <optional>
 #include <string>
@@ -7,6 +8,7 @@
 
 #include "measures/instruction_file.h"
 #include "measures/kept_steps.h"
+#include "measures/measure_file.h"
 #include "measures/objective_functions.h"
 #include "measures/output_measure.h"
 #include "measures/validation_period.h"
@@ -22,6 +24,7 @@ struct ModelDescription {
   std::vector<OutputMeasure> measures;
   std::string measureFile;  ///< output-measure file; empty when no measure is of interface type 1
   std::shared_ptr<const InstructionFile> instructions = {};  ///< where its numbers are; null: in free format
+  std::vector<MeasureFileSource> furtherMeasureFiles = {};   ///< behind the first one
   EvaluationPeriod period;
   std::vector<ValidationPeriod> validationPeriods;
   double minimumCoverage = 0.0;  ///< share of the first successful run's pairs below which a run fails
@@ -38,6 +41,12 @@ struct ModelDescription {
   bool keepSimulatedValues = false;   ///< results hold the simulated values at the observation times
   SeriesPrecision keptPrecision = SeriesPrecision::single;
   std::optional<KeptSteps> keptSteps = {};  ///< they are kept at simulated steps, too
+
+  /// Whether instruction files read results.
+  bool readsListings() const {
+    return instructions || std::any_of(measures.begin(), measures.end(),
+                                       [](const OutputMeasure& measure) { return measure.simulation.listing; });
+  }
 };
 
 }  // namespace mirevo

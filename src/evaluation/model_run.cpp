@@ -126,6 +126,9 @@ ModelRunner::ModelRunner(ModelDescription description, ParameterModel& parameter
       files.output.simulationFiles.push_back(slotPath(name, slot));
     }
     if (!description_.measureFile.empty()) files.output.measureFile = slotPath(description_.measureFile, slot);
+    for (const MeasureFileSource& file : description_.furtherMeasureFiles) {
+      files.output.furtherMeasureFiles.push_back(slotPath(file.fileName, slot));
+    }
   }
 }
 
@@ -154,6 +157,9 @@ FolderNeeds ModelRunner::folderNeeds(const LauncherSettings& settings) const {
       needs.outputs.push_back(belowBase(measure.simulation.fileName));
   }
   if (!description_.measureFile.empty()) needs.outputs.push_back(belowBase(description_.measureFile));
+  for (const MeasureFileSource& file : description_.furtherMeasureFiles) {
+    needs.outputs.push_back(belowBase(file.fileName));
+  }
   for (const std::string& name : description_.savedFiles) needs.savedFiles.push_back(belowBase(name));
   for (const BatchItem& item : settings.batchItems) needs.batchFiles.push_back(belowBase(item.batchFileName));
   return needs;
@@ -173,6 +179,7 @@ void ModelRunner::requireFilesInBaseFolder() const {
     if (measure.interfaceType == InterfaceType::timeSeries) names.push_back(measure.simulation.fileName);
   }
   if (!description_.measureFile.empty()) names.push_back(description_.measureFile);
+  for (const MeasureFileSource& file : description_.furtherMeasureFiles) names.push_back(file.fileName);
   names.insert(names.end(), description_.savedFiles.begin(), description_.savedFiles.end());
   for (const std::string& name : names) {
     if (name.starts_with(description_.baseFolder + "/")) continue;
@@ -232,7 +239,8 @@ std::optional<EvaluationFailure> ModelRunner::findUnrunnable(std::span<const dou
   return findUnwritable(std::get<std::span<const double>>(mapped));
 }
 
-std::optional<FolderDamage> ModelRunner::renewIfDamaged(int slot, std::vector<std::string>& warnings) {
+std::optional<FolderDamage> ModelRunner::renewIfDamaged(int slot, std::vector<std::string>& warnings,
+                                                        const std::function<void()>& look) {
   SlotFiles& files = slots_.at(static_cast<std::size_t>(slot - 1));
   if (!files.isUsed) return std::nullopt;
   const std::string folder = launcher_.getProcessFolder(slot);
@@ -244,7 +252,7 @@ std::optional<FolderDamage> ModelRunner::renewIfDamaged(int slot, std::vector<st
     return std::nullopt;
   }
   if (files.isRenewed) return damage;
-  if (!launcher_.renewFolder(slot)) {
+  if (!launcher_.renewFolder(slot, look)) {
     damage->why += fmt::format("; the process folder could not be made anew: {}", launcher_.lastError());
     damage->isFinal = true;
     return damage;
@@ -261,6 +269,8 @@ std::optional<FolderDamage> ModelRunner::renewIfDamaged(int slot, std::vector<st
 std::optional<FolderDamage> ModelRunner::removeResults(const SlotFiles& files) {
   std::vector<std::string> results = files.output.simulationFiles;
   if (!files.output.measureFile.empty()) results.push_back(files.output.measureFile);
+  const std::vector<std::string>& further = files.output.furtherMeasureFiles;
+  results.insert(results.end(), further.begin(), further.end());
   for (const std::string& path : results) {
     const int error = errorOfRemoval(path);
     if (isDoneByModel(error)) return FolderDamage{"Unable to remove " + path, std::strerror(error)};
@@ -269,7 +279,7 @@ std::optional<FolderDamage> ModelRunner::removeResults(const SlotFiles& files) {
   return std::nullopt;
 }
 
-std::optional<EvaluationFailure> ModelRunner::prepareModelRun(std::span<const double> set, int slot) {
+std::optional<EvaluationFailure> ModelRunner::prepareModelRun(std::span<const double> set, int slot, int number) {
   const auto mapped = parameters_.MapToModelValues(set);
   if (const auto* failure = std::get_if<ParameterFailure>(&mapped)) return parameterFailure(*failure);
   const auto modelValues = std::get<std::span<const double>>(mapped);
@@ -288,7 +298,7 @@ std::optional<EvaluationFailure> ModelRunner::prepareModelRun(std::span<const do
   }
   files.started = runTimeClock() - readingSeconds_;
   files.ended.reset();
-  shownRuns_.begin(slot, ToModelScale(parameters_.searchSpace(), set));
+  shownRuns_.begin(slot, number, ToModelScale(parameters_.searchSpace(), set));
   launcher_.createProcesses(slot);
   return std::nullopt;
 }
@@ -342,6 +352,8 @@ std::optional<EvaluationResult> ModelRunner::collectBeside(int slot, const std::
 
 bool ModelRunner::isWorthProcess() const {
   constexpr double kStarts = 4.0;
+  // What is told once of listings would be told by every process.
+  if (description_.readsListings()) return false;
   const double expected = std::min(lastReadings_[0], lastReadings_[1]);
   return leastSecondsBeside_ <= 0.0 || expected >= std::max(leastSecondsBeside_, kStarts * lastStart_);
 }

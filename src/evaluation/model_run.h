@@ -47,12 +47,15 @@ class ModelRunner final {
 
   /// To be called before a model run in the slot: if the run before it has damaged the process folder, makes that anew,
   /// with a line in `warnings`. Returns why the slot cannot be used any more: this failed, or the run in the folder
-  /// that was made anew has damaged it again. Empty if it can.
-  std::optional<FolderDamage> renewIfDamaged(int slot, std::vector<std::string>& warnings);
+  /// that was made anew has damaged it again. Empty if it can. `look` is called ten times a second while the folder is
+  /// made, and may throw to end that.
+  std::optional<FolderDamage> renewIfDamaged(int slot, std::vector<std::string>& warnings,
+                                             const std::function<void()>& look = {});
 
   /// Builds the full parameter vector, removes the results of the slot's last run, writes the parameter files and
-  /// starts the batch; or returns why the set is not run. Throws FatalError when a file cannot be removed or written.
-  std::optional<EvaluationFailure> prepareModelRun(std::span<const double> set, int slot);
+  /// starts the batch; or returns why the set is not run. `number`: of the evaluation. Throws FatalError when a file
+  /// cannot be removed or written.
+  std::optional<EvaluationFailure> prepareModelRun(std::span<const double> set, int slot, int number);
 
   /// The result of the slot's batch, which must have ended; its number is 0. Faults of the model run give a failed
   /// result: files that cannot be read in what is left of the time of a model run among them. `look` is called about

@@ -18,6 +18,7 @@
 #include "common/reading_watch.h"
 #include "common/text.h"
 #include "measures/dates.h"
+#include "measures/item_names.h"
 #include "measures/measure_file.h"
 #include "measures/statistics.h"
 #include "platform/processes/leaving_links.h"
@@ -76,10 +77,14 @@ OutputReader::OutputReader(const ModelDescription& description, const ObjectiveA
     if (measure.interfaceType != InterfaceType::measureFile) continue;
     numbersNeeded_ = std::max(numbersNeeded_, static_cast<std::size_t>(measure.measurementNo));
   }
-  if (std::error_code none; !description.measureFile.empty()) {
-    const std::uintmax_t size = std::filesystem::file_size(trimTrailing(description.measureFile), none);
-    if (!none) usualNumbers_ = size;
-  }
+  const auto noteSize = [this](const std::string& file, const std::shared_ptr<const InstructionFile>& instructions) {
+    std::error_code none;
+    const std::uintmax_t size = std::filesystem::file_size(trimTrailing(file), none);
+    usualNumbers_.push_back(none ? 0 : size);
+    if (!none && instructions) tryInstructions(std::string(trimTrailing(file)), *instructions);
+  };
+  noteSize(description.measureFile, description.instructions);
+  for (const MeasureFileSource& file : description.furtherMeasureFiles) noteSize(file.fileName, file.instructions);
   for (std::size_t i = 0; i < description.measures.size() && description.keepSimulatedValues; ++i) {
     const OutputMeasure& measure = description.measures[i];
     if (measure.interfaceType != InterfaceType::timeSeries) continue;
@@ -90,6 +95,22 @@ OutputReader::OutputReader(const ModelDescription& description, const ObjectiveA
     addSimulatedSteps(*description.keptSteps, description.measures, description.period, observedSeries_);
   }
   prepareValidation();
+}
+
+/// A listing that is in the model's folder tells of wrong instructions before all model runs fail with them. It may be
+/// one of another version of the model, and a run writes its own.
+void OutputReader::tryInstructions(const std::string& listing, const InstructionFile& instructions) {
+  std::string reason;
+  std::vector<std::string> doubts;
+  if (readMeasureFile(listing, 0, reason, series_.watch(), &instructions, &doubts)) {
+    warnings_.insert(warnings_.end(), doubts.begin(), doubts.end());
+    hasToldDoubts_ = hasToldDoubts_ || !doubts.empty();
+    return;
+  }
+  warnings_.push_back(fmt::format(
+      "{}\nThis listing, as it is in the model's folder now, is not as the instruction file says. A model run that "
+      "writes such a one has failed",
+      reason));
 }
 
 void OutputReader::prepareValidation() {
@@ -232,6 +253,7 @@ EvaluationResult OutputReader::failedResult(EvaluationFailure failure) const {
 std::optional<EvaluationFailure> OutputReader::findMissing(const OutputFiles& files) {
   std::vector<std::string> wanted = files.simulationFiles;
   if (!files.measureFile.empty()) wanted.push_back(files.measureFile);
+  wanted.insert(wanted.end(), files.furtherMeasureFiles.begin(), files.furtherMeasureFiles.end());
   for (const std::string& path : wanted) {
     struct stat status {};
     if (::stat(path.c_str(), &status) == 0) {
@@ -247,23 +269,42 @@ std::optional<EvaluationFailure> OutputReader::findMissing(const OutputFiles& fi
   return std::nullopt;
 }
 
+std::optional<MeasureFile> OutputReader::readNumbers(const OutputFiles& files, std::string& reason,
+                                                     std::vector<std::string>& doubts) {
+  const auto isTooLarge = [&reason](const std::string& file, std::uintmax_t usual) {
+    const std::string fault = faultOfSize(file, usual);
+    if (!fault.empty()) reason = fmt::format("{}: {}", file, fault);
+    return !fault.empty();
+  };
+  if (isTooLarge(files.measureFile, usualNumbers_.front())) return std::nullopt;
+  auto all = readMeasureFile(files.measureFile, numbersNeeded_, reason, series_.watch(),
+                             description_.instructions.get(), &doubts);
+  for (std::size_t i = 0; all && i < files.furtherMeasureFiles.size(); ++i) {
+    const std::string& name = files.furtherMeasureFiles[i];
+    if (isTooLarge(name, usualNumbers_[i + 1])) return std::nullopt;
+    const InstructionFile* const instructions = description_.furtherMeasureFiles[i].instructions.get();
+    const auto more = readMeasureFile(name, 0, reason, series_.watch(), instructions, &doubts);
+    if (!more) return std::nullopt;
+    all->numbers.insert(all->numbers.end(), more->numbers.begin(), more->numbers.end());
+    all->endsLine = all->endsLine && more->endsLine;
+  }
+  return all;
+}
+
 std::optional<EvaluationFailure> OutputReader::readMeasures(const OutputFiles& files, EvaluationResult& result) {
   MeasureFile written;
   if (!files.measureFile.empty()) {
     std::string reason;
-    std::optional<MeasureFile> file;
-    if (const std::string tooLarge = faultOfSize(files.measureFile, usualNumbers_); !tooLarge.empty()) {
-      reason = fmt::format("{}: {}", files.measureFile, tooLarge);
-    } else {
-      file =
-          readMeasureFile(files.measureFile, numbersNeeded_, reason, series_.watch(), description_.instructions.get());
-    }
+    std::vector<std::string> doubts;
+    std::optional<MeasureFile> file = readNumbers(files, reason, doubts);
+    if (file && !doubts.empty() && !std::exchange(hasToldDoubts_, true)) result.warnings = std::move(doubts);
     if (!file) return failureOf(Kind::resultsNotReadable, std::move(reason));
     written = std::move(*file);
   }
   if (auto unusable = series_.tryOpenSimulationFiles(files.simulationFiles)) {
     return failureOf(Kind::resultsNotReadable, std::move(*unusable));
   }
+  for (std::string& doubt : series_.takeDoubts()) result.warnings.push_back(std::move(doubt));
   std::optional<EvaluationFailure> failure;
   std::vector<std::optional<FileForm>> forms(files.simulationFiles.size());
   bool hasForm = false;  // of the output-measure file
@@ -284,8 +325,8 @@ std::optional<EvaluationFailure> OutputReader::readMeasures(const OutputFiles& f
     }
     const auto number = static_cast<std::size_t>(measure.measurementNo);
     if (number <= written.numbers.size()) {
-      result.measureValues[i] = written.numbers[number - 1];
-      if (description_.computeExactMeasures) result.exactMeasures[i] = written.numbers[number - 1];
+      result.measureValues[i] = measure.valueOf(written.numbers[number - 1]);
+      if (description_.computeExactMeasures) result.exactMeasures[i] = result.measureValues[i];
     } else {
       failure = failureOf(Kind::resultsNotReadable, fmt::format("{}: expected at least {} numbers, found {}",
                                                                 files.measureFile, number, written.numbers.size()));
@@ -307,6 +348,13 @@ std::optional<EvaluationFailure> OutputReader::readSeriesMeasure(const std::stri
   if (measure.simulation.itemNo > simulation.itemCount()) {
     return failureOf(Kind::resultsNotReadable, fmt::format("{}: expected item No. {}, found {} items", path,
                                                            measure.simulation.itemNo, simulation.itemCount()));
+  }
+  if (const std::string found = simulation.itemName(measure.simulation.itemNo);
+      !measure.simulation.itemName.empty() && !isItemCalled(found, measure.simulation.itemName)) {
+    return failureOf(
+        Kind::resultsNotReadable,
+        fmt::format("{}: expected item No. {} to be {}, as in the file of the model's folder, found {}", path,
+                    measure.simulation.itemNo, quotedForMessage(measure.simulation.itemName), quotedForMessage(found)));
   }
   try {
     // A model that stopped early is a failed evaluation; a setup whose period no model run can match ends the run.

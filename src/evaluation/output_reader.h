@@ -9,6 +9,7 @@
 #include "evaluation/evaluation_result.h"
 #include "evaluation/model_description.h"
 #include "evaluation/run_comparison.h"
+#include "measures/measure_file.h"
 #include "measures/measure_statistics.h"
 #include "measures/objective_functions.h"
 #include "measures/observed_series.h"
@@ -21,6 +22,7 @@ struct OutputFiles {
   std::string folder;                        ///< the process folder
   std::vector<std::string> simulationFiles;  ///< in the order of OutputReader::simulationFileNames()
   std::string measureFile;                   ///< empty when there is none
+  std::vector<std::string> furtherMeasureFiles = {};
 };
 
 /// Turns the files that a model run has left into a result: its measures, objective functions and aggregate, or why it
@@ -79,10 +81,14 @@ class OutputReader final {
     OutputMeasure measure;
     EvaluationPeriod period;
   };
+  void tryInstructions(const std::string& listing, const InstructionFile& instructions);
   void prepareValidation();
   /// Fills in the measures in the validation periods.
   void validate(EvaluationResult& result);
   static std::optional<EvaluationFailure> findMissing(const OutputFiles& files);
+  /// The numbers of all output-measure files; empty, with a reason, if one cannot be used.
+  std::optional<MeasureFile> readNumbers(const OutputFiles& files, std::string& reason,
+                                         std::vector<std::string>& doubts);
   /// Fills in the measures and simulated values and leaves the series open; returns a failure if the model's output
   /// cannot be used.
   std::optional<EvaluationFailure> readMeasures(const OutputFiles& files, EvaluationResult& result);
@@ -99,8 +105,9 @@ class OutputReader final {
   EvaluationPeriod shownPeriod_;
   std::vector<Validated> validated_;
   std::vector<std::string> warnings_;
-  std::size_t numbersNeeded_ = 0;    ///< in the output-measure file
-  std::uintmax_t usualNumbers_ = 0;  ///< size of that file as it was found at the start
+  std::size_t numbersNeeded_ = 0;             ///< in the output-measure files
+  std::vector<std::uintmax_t> usualNumbers_;  ///< sizes of these files as they were found at the start
+  bool hasToldDoubts_ = false;                ///< what the instructions read of a listing and may not mean
   std::vector<ObservedSeries> observedSeries_;
   RunStandard standard_;
 };

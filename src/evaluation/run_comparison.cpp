@@ -75,7 +75,8 @@ std::vector<MeasureSource> measureSources(std::span<const OutputMeasure> measure
   std::vector<MeasureSource> sources;
   for (const OutputMeasure& measure : measures) {
     const bool isSeries = measure.interfaceType == InterfaceType::timeSeries;
-    std::string file(trimTrailing(isSeries ? measure.simulation.fileName : measureFile));
+    const std::string& ofNumber = measure.measureFile.empty() ? measureFile : measure.measureFile;
+    std::string file(trimTrailing(isSeries ? measure.simulation.fileName : ofNumber));
     if (file.starts_with(baseFolder + "/")) file.erase(0, baseFolder.size() + 1);
     MeasureSource& source = sources.emplace_back();
     source = {std::string(trimTrailing(measure.name)), std::move(file), isSeries};

@@ -118,6 +118,8 @@ class RunComparison final {
     return (rules_.requiresShare && firstNumber_ == 0) || (rules_.requiresProof && !anyHasSucceeded_);
   }
   RunStandard standard() const;
+  /// Of the first successful run; 0: not known.
+  int firstNumber() const { return firstNumber_; }
 
  private:
   const MeasurePairs* firstOf(std::size_t measure) const;

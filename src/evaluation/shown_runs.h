@@ -14,13 +14,12 @@ namespace mirevo {
 class ShownRuns final {
  public:
   /// `setupValues`: the initial values of the variable parameters, model scale.
-  /// `firstRuns`: so many of the process's first ones pass on theirs, whatever their results.
+  /// `firstRuns`: so many of the first ones of the whole run pass on theirs, whatever their results.
   explicit ShownRuns(std::vector<double> setupValues, int firstRuns = 0)
       : initial_(std::move(setupValues)), firstRuns_(firstRuns) {}
 
-  /// A model run with these values (model scale) begins in the slot. To be called in the order of the evaluation
-  /// numbers.
-  void begin(int slot, std::vector<double> parameterValues);
+  /// The model run of an evaluation with these values (model scale) begins in the slot. They may begin in any order.
+  void begin(int slot, int number, std::vector<double> parameterValues);
 
   /// Whether the slot's run, which has succeeded with this aggregate, may be shown: if it is the initial one of this
   /// process so far, or not worse than any before (of equals a search may take any). A run whose aggregate is not known
@@ -31,7 +30,7 @@ class ShownRuns final {
 
  private:
   struct Run {
-    int order = 0;
+    int number = 0;
     std::vector<double> parameterValues;
   };
   /// Of the initial evaluation nothing is asked here.
@@ -39,7 +38,6 @@ class ShownRuns final {
 
   InitialChoice initial_;
   std::map<int, Run> runs_;  ///< by slot
-  int begun_ = 0;
   int firstRuns_ = 0;
   double best_ = std::numeric_limits<double>::infinity();
 };

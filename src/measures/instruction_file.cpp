@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <span>
 #include <unordered_map>
 #include <utility>
 
@@ -31,6 +32,40 @@ bool separates(char c) {
 
 std::string shortQuoted(std::string_view text) {
   return quotedForMessage(text.substr(0, kLongestQuoted));
+}
+
+bool isDigit(char c) {
+  return c >= '0' && c <= '9';
+}
+bool isDigitOrPoint(char c) {
+  return isDigit(c) || c == '.';
+}
+bool isSign(char c) {
+  return c == '+' || c == '-';
+}
+bool isExponent(char c) {
+  return c == 'e' || c == 'E' || c == 'd' || c == 'D';
+}
+
+/// Whether a number goes on from the character before `at` to the one there: through its digits, or through its
+/// exponent. Its sign in front of its first digit does not count.
+bool isInsideNumber(std::string_view line, std::size_t at) {
+  if (at == 0 || at >= line.size()) return false;
+  const char left = line[at - 1];
+  const char right = line[at];
+  const auto isAt = [line](std::size_t place, auto is) { return place < line.size() && is(line[place]); };
+  if (isDigitOrPoint(left) && isDigitOrPoint(right)) return true;
+  if (isDigitOrPoint(left) && isExponent(right)) {
+    return isAt(at + 1, isDigit) || (isAt(at + 1, isSign) && isAt(at + 2, isDigit));
+  }
+  if (isExponent(left) && at > 1 && isDigitOrPoint(line[at - 2])) {
+    return isDigit(right) || (isSign(right) && isAt(at + 1, isDigit));
+  }
+  return isSign(left) && isDigit(right) && at > 2 && isExponent(line[at - 2]) && isDigitOrPoint(line[at - 3]);
+}
+/// The same with its sign.
+bool isInsideSigned(std::string_view line, std::size_t at) {
+  return isInsideNumber(line, at) || (at > 0 && at < line.size() && isSign(line[at - 1]) && isDigitOrPoint(line[at]));
 }
 
 }  // namespace
@@ -243,6 +278,7 @@ class ListingReader final {
 
   /// False where the listing is not as the instructions of a line say.
   bool follow(const std::vector<Instruction>& instructions) {
+    instructions_ = instructions;
     for (std::size_t i = 0; i < instructions.size(); ++i) {
       current_ = &instructions[i];
       next_ = i + 1 < instructions.size() ? &instructions[i + 1] : nullptr;
@@ -262,6 +298,16 @@ class ListingReader final {
   std::size_t column() const { return std::min(at_, line_.size()) + 1; }
   const std::string& fault() const { return fault_; }
 
+  /// Columns that have cut a number in two.
+  struct Cut {
+    std::size_t lineNumber = 0;
+    const Instruction* columns = nullptr;
+    std::string number = {};  ///< the whole of it, with what touches it
+    std::string taken = {};
+  };
+  const std::optional<Cut>& firstCut() const { return firstCut_; }
+  std::size_t cutCount() const { return cutCount_; }
+
  private:
   bool fail(std::string text) {
     fault_ = std::move(text);
@@ -270,6 +316,7 @@ class ListingReader final {
 
   bool step() {
     const bool isBehindNumber = std::exchange(isBehindNumber_, false);
+    isBehindMarker_ = current_ != &instructions_.front() && (current_ - 1)->isMarker();
     switch (current_->kind) {
       case Kind::primaryMarker:
         return findLine();
@@ -371,7 +418,27 @@ class ListingReader final {
     const auto [first, last] = std::pair(current_->first - 1, std::min(current_->last, line_.size()));
     at_ = std::min(first, line_.size());
     if (first >= line_.size()) return take({}, line_.size());
-    return take(trim(line_.substr(first, last - first)), last);
+    const std::string_view text = trim(line_.substr(first, last - first));
+    noteCut(first, last, text);
+    return take(text, last);
+  }
+
+  /// Where numbers stand without blanks between them, other columns go on with what these leave.
+  void noteCut(std::size_t first, std::size_t last, std::string_view text) {
+    const auto isOfOthers = [this](auto touches) {
+      return std::ranges::any_of(
+          instructions_, [&](const Instruction& other) { return other.kind == Kind::inColumns && touches(other); });
+    };
+    const bool cutsLeft = current_->name && isInsideSigned(line_, first) &&
+                          !isOfOthers([&](const Instruction& other) { return other.last == first; });
+    const bool isReadOn = current_->name || (next_ != nullptr && next_->kind == Kind::nextNumber);
+    const bool cutsRight = isReadOn && isInsideNumber(line_, last) &&
+                           !isOfOthers([&](const Instruction& other) { return other.first == last + 1; });
+    if (!cutsLeft && !cutsRight) return;
+    ++cutCount_;
+    if (!firstCut_) {
+      firstCut_ = Cut{lineNumber_, current_, std::string(tokenAround(cutsLeft ? first : last)), std::string(text)};
+    }
   }
 
   bool readTouching() {
@@ -394,12 +461,20 @@ class ListingReader final {
     const auto skip = [this] {
       while (at_ < line_.size() && isBlank(line_[at_])) ++at_;
     };
+    if (current_->name && isBehindMarker_ && isInsideNumber(line_, at_)) {
+      return fail(fmt::format("the marker in front of the number ends within {}: expected one that leaves it whole",
+                              shortQuoted(tokenAround(at_))));
+    }
     skip();
     if (isBehindNumber && at_ < line_.size() && line_[at_] == ',') ++at_;
     skip();
     std::size_t end = at_;
     while (end < line_.size() && !separates(line_[end])) ++end;
     if (next_ != nullptr && next_->kind == Kind::secondaryMarker) end = std::min(end, line_.find(next_->text, at_));
+    if (current_->name && isInsideNumber(line_, end)) {
+      return fail(fmt::format("the marker behind the number begins within {}: expected one that leaves it whole",
+                              shortQuoted(tokenAround(end))));
+    }
     return take(line_.substr(at_, end - at_), end);
   }
 
@@ -427,17 +502,22 @@ class ListingReader final {
   std::vector<double>& values_;
   const Instruction* current_ = nullptr;
   const Instruction* next_ = nullptr;  ///< of the same line
+  std::span<const Instruction> instructions_;
   std::string_view line_;
   std::size_t lineNumber_ = 0;
   std::size_t at_ = 0;  ///< of the next character
   bool isBehindNumber_ = false;
+  bool isBehindMarker_ = false;
+  std::optional<Cut> firstCut_;
+  std::size_t cutCount_ = 0;
   std::string fault_;
 };
 
 }  // namespace
 
 std::optional<std::vector<double>> InstructionFile::read(const std::string& sourceName, std::string_view content,
-                                                         std::string& reason, ReadingWatch* watch) const {
+                                                         std::string& reason, ReadingWatch* watch,
+                                                         std::vector<std::string>* doubts) const {
   std::vector<double> values(names_.size(), std::nan(""));
   ListingReader reader(content, watch, values);
   for (const std::vector<Instruction>& line : lines_) {
@@ -451,6 +531,13 @@ std::optional<std::vector<double>> InstructionFile::read(const std::string& sour
     reason = fmt::format("{}:{}:{}: {} ({}{}:{}:{})", sourceName, reader.lineNumber(), reader.column(), reader.fault(),
                          what, sourceName_, at.line, at.column);
     return std::nullopt;
+  }
+  if (const auto& cut = reader.firstCut(); cut && doubts != nullptr) {
+    const Instruction& at = *cut->columns;
+    const std::string more = reader.cutCount() > 1 ? fmt::format("; so do {} more", reader.cutCount() - 1) : "";
+    doubts->push_back(fmt::format("{}:{}:{}: the columns {}:{} cut {}, of which {} is read ({}:{}:{}){}", sourceName,
+                                  cut->lineNumber, at.first, at.first, at.last, shortQuoted(cut->number),
+                                  shortQuoted(cut->taken), sourceName_, at.line, at.column, more));
   }
   return values;
 }

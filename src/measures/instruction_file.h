@@ -31,9 +31,11 @@ class InstructionFile final {
   std::optional<std::size_t> placeOf(std::string_view name) const;
 
   /// One number per name from a listing; empty, with the place in the listing and that of the instruction in `reason`,
-  /// where it is not as the instructions say. `watch` may be null.
+  /// where it is not as the instructions say. `watch` may be null. Columns that cut a number in two, unless others go
+  /// on with it, are what the instructions say, but hardly what they mean: `doubts` (may be null) gets a line of them.
   std::optional<std::vector<double>> read(const std::string& sourceName, std::string_view content, std::string& reason,
-                                          ReadingWatch* watch = nullptr) const;
+                                          ReadingWatch* watch = nullptr,
+                                          std::vector<std::string>* doubts = nullptr) const;
 
   struct Instruction {
     enum class Kind { primaryMarker, lines, secondaryMarker, whitespace, tab, inColumns, touchingColumns, nextNumber };

@@ -6,6 +6,7 @@
 #include <map>
 #include <string>
 #include <string_view>
+#include <tuple>
 #include <utility>
 #include <vector>
 
@@ -24,7 +25,7 @@ namespace {
 /// Each secondNumber() between `first` and `last`, both included, that is one of a step.
 std::vector<std::int64_t> readSteps(const SeriesReference& simulation, const DateRecord& first,
                                     const DateRecord& last) {
-  const auto series = openTimeSeries(simulation.fileName, simulation.fileLocation);
+  const auto series = openTimeSeries(simulation);
   std::vector<std::int64_t> seconds;
   if (const auto start = series->startTime()) {
     for (const double days : series->times()) {
@@ -75,12 +76,13 @@ void addTimes(std::span<const std::int64_t> steps, ObservedSeries& observed) {
 
 void addSimulatedSteps(const KeptSteps& kept, std::span<const OutputMeasure> measures, const EvaluationPeriod& period,
                        std::span<ObservedSeries> observed) {
-  std::map<std::string, std::vector<std::int64_t>> steps;  // by file
+  // By file and form.
+  std::map<std::tuple<std::string, TextForm, const void*>, std::vector<std::int64_t>> steps;
   for (ObservedSeries& series : observed) {
     const OutputMeasure& measure = measures[series.measure];
     if (!measure.timeMatch.isUsual()) continue;  // its times are those of the observations
     const SeriesReference& simulation = measure.simulation;
-    std::vector<std::int64_t>& ofFile = steps[simulation.fileName];
+    std::vector<std::int64_t>& ofFile = steps[{simulation.fileName, simulation.form, simulation.listing.get()}];
     if (ofFile.empty()) ofFile = readSteps(simulation, period.start, kept.end.value_or(period.end));
     addTimes(ofFile, series);
   }

@@ -117,7 +117,8 @@ std::optional<MeasureFile> parseMeasureFile(const std::string& sourceName, std::
 }
 
 std::optional<MeasureFile> readMeasureFile(const std::string& fileName, std::size_t neededCount, std::string& reason,
-                                           ReadingWatch& watch, const InstructionFile* instructions) {
+                                           ReadingWatch& watch, const InstructionFile* instructions,
+                                           std::vector<std::string>* doubts) {
   std::string systemReason;
   const std::optional<std::string> content = readTextFile(fileName, systemReason, watch);
   if (!content) {
@@ -125,7 +126,7 @@ std::optional<MeasureFile> readMeasureFile(const std::string& fileName, std::siz
     return std::nullopt;
   }
   if (instructions == nullptr) return parseMeasureFile(fileName, *content, neededCount, reason, &watch);
-  auto numbers = instructions->read(fileName, *content, reason, &watch);
+  auto numbers = instructions->read(fileName, *content, reason, &watch, doubts);
   if (!numbers) return std::nullopt;
   return MeasureFile{*std::move(numbers), endsLine(*content)};
 }

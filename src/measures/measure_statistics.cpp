@@ -24,6 +24,7 @@ std::string listItems(const TimeSeriesObject& series) {
   for (int item = 1; item <= std::min(series.itemCount(), kMostNames); ++item) {
     text += fmt::format("\n{}: {}", item, series.itemName(item));
   }
+  if (series.itemCount() > kMostNames) text += fmt::format("\nand {} more", series.itemCount() - kMostNames);
   return text;
 }
 
@@ -314,7 +315,9 @@ void requireItem(TimeSeriesObject& series, const SeriesReference& reference) {
     detail += listItems(series);
     fatalError(withNumber("Error: Item No. % not found in ", reference.itemNo) + name, detail);
   }
-  if (!series.getData(reference.itemNo)) fatalError("Error getting data of TS item in " + name, series.lastError());
+  if (!series.getData(reference.itemNo)) {
+    fatalError("Error getting data of TS item in " + name, series.lastError() + series.firstLines());
+  }
 }
 
 MeasureStatistics computeMeasureStatistics(const OutputMeasure& measure, const EvaluationPeriod& period,

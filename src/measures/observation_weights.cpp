@@ -141,7 +141,8 @@ std::vector<int> ObservationWeighting::items() const {
 
 bool ObservationWeighting::operator==(const ObservationWeighting& other) const {
   const auto meaning = [](const ObservationWeighting& w) {
-    return std::tie(w.weightItem, w.errorItem, w.qualityItem, w.leftOut, w.downWeighted, w.qualityWeight);
+    return std::tie(w.weightItem, w.errorItem, w.qualityItem, w.weightName, w.errorName, w.qualityName, w.leftOut,
+                    w.downWeighted, w.qualityWeight);
   };
   return meaning(*this) == meaning(other);
 }
@@ -227,9 +228,13 @@ void requireCounting(TimeSeriesObject& observation, const OutputMeasure& measure
 
 std::string describeWeighting(const ObservationWeighting& weighting) {
   std::vector<std::string> parts;
-  if (weighting.weightItem != 0) parts.push_back(fmt::format("weights in item No. {}", weighting.weightItem));
-  if (weighting.errorItem != 0) parts.push_back(fmt::format("standard errors in item No. {}", weighting.errorItem));
-  if (weighting.qualityItem != 0) parts.push_back(fmt::format("quality codes in item No. {}", weighting.qualityItem));
+  const auto addItem = [&parts](std::string_view what, std::int32_t item, const std::string& name) {
+    if (!name.empty()) parts.push_back(fmt::format("{} in item {}", what, quotedForMessage(name)));
+    if (name.empty() && item != 0) parts.push_back(fmt::format("{} in item No. {}", what, item));
+  };
+  addItem("weights", weighting.weightItem, weighting.weightName);
+  addItem("standard errors", weighting.errorItem, weighting.errorName);
+  addItem("quality codes", weighting.qualityItem, weighting.qualityName);
   if (!weighting.leftOut.empty()) parts.push_back(fmt::format("left out {}", fmt::join(weighting.leftOut, " ")));
   if (!weighting.downWeighted.empty()) {
     parts.push_back(fmt::format("weight {} for {}", weighting.qualityWeight, fmt::join(weighting.downWeighted, " ")));

@@ -15,9 +15,12 @@ struct OutputMeasure;
 /// What other items of an observation file say of how much each observation counts. A weight multiplies the difference
 /// of its pair.
 struct ObservationWeighting {
-  std::int32_t weightItem = 0;       ///< with weights; 0: none
-  std::int32_t errorItem = 0;        ///< with standard errors, of which the weights are the inverses; 0: none
-  std::int32_t qualityItem = 0;      ///< with quality codes; 0: none
+  std::int32_t weightItem = 0;   ///< with weights; 0: none
+  std::int32_t errorItem = 0;    ///< with standard errors, of which the weights are the inverses; 0: none
+  std::int32_t qualityItem = 0;  ///< with quality codes; 0: none
+  std::string weightName = {};   ///< the names of these items as the setup has them; empty: of a number
+  std::string errorName = {};
+  std::string qualityName = {};
   std::vector<double> leftOut;       ///< codes of observations that do not count
   std::vector<double> downWeighted;  ///< codes of those with a factor on their weight
   double qualityWeight = 0.5;        ///< that factor
@@ -26,8 +29,12 @@ struct ObservationWeighting {
   std::string weightLocation = {};
   std::string qualityLocation = {};
 
+  /// Whether the setup tells such an item, whose number need not be known yet.
+  bool hasWeights() const { return weightItem != 0 || !weightName.empty(); }
+  bool hasErrors() const { return errorItem != 0 || !errorName.empty(); }
+  bool hasCodes() const { return qualityItem != 0 || !qualityName.empty(); }
   /// Whether an observation may have a weight other than 0 and 1.
-  bool weighs() const { return weightItem != 0 || errorItem != 0 || !downWeighted.empty(); }
+  bool weighs() const { return hasWeights() || hasErrors() || !downWeighted.empty(); }
   bool isUsed() const { return weighs() || !leftOut.empty(); }
   /// Its items, without 0.
   std::vector<int> items() const;

@@ -42,6 +42,23 @@ PeriodSeries readSteps(TimeSeriesObject& series, const SeriesReference& referenc
   return read;
 }
 
+/// Whether the simulated series that is shown is the same, and the observed one but for observations that do not count.
+bool isMatchedAlike(const OutputMeasure& a, const OutputMeasure& b) {
+  return isSameItems(a, b) && a.timeMatch == b.timeMatch;
+}
+
+std::vector<std::size_t> firstOfEach(std::span<const OutputMeasure> measures,
+                                     bool (*isSame)(const OutputMeasure&, const OutputMeasure&)) {
+  std::vector<std::size_t> distinct;
+  for (std::size_t i = 0; i < measures.size(); ++i) {
+    if (measures[i].interfaceType != InterfaceType::timeSeries) continue;
+    const bool isRepeated = std::any_of(distinct.begin(), distinct.end(),
+                                        [&](std::size_t other) { return isSame(measures[i], measures[other]); });
+    if (!isRepeated) distinct.push_back(i);
+  }
+  return distinct;
+}
+
 }  // namespace
 
 PeriodSeries readPeriodSeries(TimeSeriesObject& series, const SeriesReference& reference,
@@ -76,7 +93,8 @@ std::vector<float> valuesAt(const PeriodSeries& series, std::span<const std::int
 
 bool isSameItems(const OutputMeasure& a, const OutputMeasure& b) {
   const auto isSame = [](const SeriesReference& left, const SeriesReference& right) {
-    return left.fileName == right.fileName && left.itemNo == right.itemNo;
+    return left.fileName == right.fileName && left.form == right.form && left.itemNo == right.itemNo &&
+           left.itemName == right.itemName && left.listing == right.listing;
   };
   return isSame(a.simulation, b.simulation) && isSame(a.observation, b.observation);
 }
@@ -87,14 +105,12 @@ bool isSamePair(const OutputMeasure& a, const OutputMeasure& b) {
 }
 
 std::vector<std::size_t> measuresOfDistinctPairs(std::span<const OutputMeasure> measures) {
-  std::vector<std::size_t> distinct;
-  for (std::size_t i = 0; i < measures.size(); ++i) {
-    if (measures[i].interfaceType != InterfaceType::timeSeries) continue;
-    const bool isRepeated = std::any_of(distinct.begin(), distinct.end(),
-                                        [&](std::size_t other) { return isSamePair(measures[i], measures[other]); });
-    if (!isRepeated) distinct.push_back(i);
-  }
-  return distinct;
+  std::vector<std::size_t> distinct = firstOfEach(measures, isSamePair);
+  return distinct.size() > kMostShownPairs ? firstOfEach(measures, isMatchedAlike) : distinct;
+}
+
+std::size_t pairsShownWithOthers(std::span<const OutputMeasure> measures) {
+  return firstOfEach(measures, isSamePair).size() - measuresOfDistinctPairs(measures).size();
 }
 
 }  // namespace mirevo

@@ -39,7 +39,14 @@ bool isSameItems(const OutputMeasure& a, const OutputMeasure& b);
 /// Whether they also do so in the same way, with the same observations and weights.
 bool isSamePair(const OutputMeasure& a, const OutputMeasure& b);
 
-/// The measures that compare series, 0-based; of several that compare the same pair only the first.
+/// Of more pairs than these, those of the same items are shown once, whatever observations of them the measures count:
+/// series that are kept and shown would otherwise grow with the number of measures.
+inline constexpr std::size_t kMostShownPairs = 100;
+
+/// The measures whose series are shown, 0-based: of several that compare the same pair only the first, and of more than
+/// kMostShownPairs only the first that matches the same items in the same way.
 std::vector<std::size_t> measuresOfDistinctPairs(std::span<const OutputMeasure> measures);
+/// How many pairs are not shown for that reason.
+std::size_t pairsShownWithOthers(std::span<const OutputMeasure> measures);
 
 }  // namespace mirevo

@@ -16,6 +16,7 @@
 #include "common/files.h"
 #include "common/text.h"
 #include "measures/dates.h"
+#include "measures/listing_series.h"
 #include "measures/measure_statistics.h"
 #include "measures/observed_series.h"
 #include "measures/shown_above.h"
@@ -25,14 +26,29 @@
 namespace mirevo {
 namespace {
 
-/// Index of the name in the table, to which a new name is added. Names are case-sensitive; trailing blanks do not
-/// count.
-std::size_t indexOf(std::vector<std::string>& table, std::string_view name) {
-  const std::string_view trimmed = trimTrailing(name);
-  const auto found = std::find(table.begin(), table.end(), trimmed);
+/// Index of the file in the table, to which a new one is added. Names are case-sensitive; trailing blanks do not count.
+/// A file that is read in two forms is there twice.
+std::size_t indexOf(std::vector<SeriesReference>& table, const SeriesReference& reference) {
+  const std::string_view name = trimTrailing(reference.fileName);
+  const auto found = std::find_if(table.begin(), table.end(), [&](const SeriesReference& other) {
+    return other.fileName == name && other.form == reference.form && other.listing == reference.listing;
+  });
   if (found != table.end()) return static_cast<std::size_t>(found - table.begin());
-  table.emplace_back(trimmed);
+  table.push_back(reference);
+  table.back().fileName = name;
   return table.size() - 1;
+}
+
+std::vector<std::string> namesOf(const std::vector<SeriesReference>& files) {
+  std::vector<std::string> names;
+  for (const SeriesReference& file : files) names.push_back(file.fileName);
+  return names;
+}
+
+std::unique_ptr<TimeSeriesObject> makeSeries(const std::string& path, std::string& reason,
+                                             std::shared_ptr<SeriesReading> reading, const SeriesReference& reference) {
+  if (reference.listing) return std::make_unique<ListingSeries>(reference.listing, std::move(reading));
+  return createTimeSeriesObject(path, reason, std::move(reading), reference.form);
 }
 
 /// Why the results of a model run in this file cannot be used; empty when they can.
@@ -55,12 +71,12 @@ std::optional<std::string> findUnusable(TimeSeriesObject& series, const std::str
 constexpr std::string_view kTooMuchMemory = "reading it takes more memory than there is";
 
 /// Why the file of a model run cannot be opened, or its items in use not be read; empty, with `series`, when they can.
-std::optional<std::string> tryOpen(const std::string& path, std::uintmax_t usualSize, std::span<const int> items,
-                                   const std::shared_ptr<SeriesReading>& reading,
+std::optional<std::string> tryOpen(const std::string& path, const SeriesReference& file, std::uintmax_t usualSize,
+                                   std::span<const int> items, const std::shared_ptr<SeriesReading>& reading,
                                    std::unique_ptr<TimeSeriesObject>& series) {
   std::string reason;
-  series = createTimeSeriesObject(path, reason, reading);
-  if (series && isTextSeries(path)) reason = faultOfSize(path, usualSize);
+  series = makeSeries(path, reason, reading, file);
+  if (series && (file.listing || isTextSeries(path, file.form))) reason = faultOfSize(path, usualSize);
   if (!reason.empty()) return fmt::format("{}: {}", path, reason);
   try {
     series->willRead(items);
@@ -94,19 +110,22 @@ std::string spanText(const TimeSeriesObject& series) {
 
 }  // namespace
 
-std::unique_ptr<TimeSeriesObject> openTimeSeries(const std::string& fileName, const std::string& setupLocation,
+std::unique_ptr<TimeSeriesObject> openTimeSeries(const SeriesReference& reference,
                                                  std::shared_ptr<SeriesReading> reading, std::span<const int> items) {
-  const std::string name(trimTrailing(fileName));
+  const std::string name(trimTrailing(reference.fileName));
   const std::string message = "Error opening TS object for file: " + name;
   std::string reason;
-  std::unique_ptr<TimeSeriesObject> series = createTimeSeriesObject(name, reason, std::move(reading));
-  if (!series) fatalError("Error creating TS object for file: " + name, setupLocation + reason);
+  std::unique_ptr<TimeSeriesObject> series = makeSeries(name, reason, std::move(reading), reference);
+  if (!series) {
+    fatalError("Error creating TS object for file: " + name,
+               (reference.form.isGiven ? reference.formLocation : reference.fileLocation) + reason);
+  }
   try {
     series->willRead(items);
-    if (!series->open(name)) fatalError(message, setupLocation + series->lastError());
+    if (!series->open(name)) fatalError(message, reference.fileLocation + series->lastError() + series->firstLines());
   } catch (const std::bad_alloc&) {
     series.reset();
-    fatalError(message, fmt::format("{}{}: {}", setupLocation, name, kTooMuchMemory));
+    fatalError(message, fmt::format("{}{}: {}", reference.fileLocation, name, kTooMuchMemory));
   }
   return series;
 }
@@ -116,8 +135,7 @@ SeriesTables::SeriesTables() : reading_(std::make_shared<SeriesReading>()) {}
 SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> measures, const EvaluationPeriod& period,
                                               bool isForRuns) {
   SeriesTables tables;
-  std::vector<std::string> observationLocations;  // of the measure that names a file first
-  std::vector<std::string> simulationLocations;
+  std::vector<SeriesReference> observations;  // that of the measure that names a file first
   std::vector<std::vector<int>> observationItems;
   for (const OutputMeasure& measure : measures) {
     if (measure.interfaceType != InterfaceType::timeSeries) {
@@ -125,21 +143,17 @@ SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> mea
       tables.simulationIndex_.push_back(kNoSeries);
       continue;
     }
-    tables.observationIndex_.push_back(indexOf(tables.observationNames_, measure.observation.fileName));
-    if (tables.observationNames_.size() > observationLocations.size()) {
-      observationLocations.push_back(measure.observation.fileLocation);
-    }
-    observationItems.resize(tables.observationNames_.size());
+    tables.observationIndex_.push_back(indexOf(observations, measure.observation));
+    observationItems.resize(observations.size());
     std::vector<int>& items = observationItems[tables.observationIndex_.back()];
     items.push_back(measure.observation.itemNo);
     for (const int item : measure.weighting.items()) items.push_back(item);
-    tables.simulationIndex_.push_back(indexOf(tables.simulationNames_, measure.simulation.fileName));
-    if (tables.simulationNames_.size() > simulationLocations.size()) {
-      simulationLocations.push_back(measure.simulation.fileLocation);
-    }
-    tables.simulationItems_.resize(tables.simulationNames_.size());
+    tables.simulationIndex_.push_back(indexOf(tables.simulationFiles_, measure.simulation));
+    tables.simulationItems_.resize(tables.simulationFiles_.size());
     tables.simulationItems_[tables.simulationIndex_.back()].push_back(measure.simulation.itemNo);
   }
+  tables.observationNames_ = namesOf(observations);
+  tables.simulationNames_ = namesOf(tables.simulationFiles_);
   // In ascending order, so that the columns of a text file are found quickly one after another.
   for (std::vector<std::vector<int>>* const table : {&tables.simulationItems_, &observationItems}) {
     for (std::vector<int>& items : *table) {
@@ -147,17 +161,18 @@ SeriesTables SeriesTables::MirevoTSobjectInit(std::span<const OutputMeasure> mea
       items.erase(std::unique(items.begin(), items.end()), items.end());
     }
   }
-  const auto open = [&tables](const std::string& name, const std::string& location, std::span<const int> items) {
-    auto series = openTimeSeries(name, location, tables.reading_, items);
-    for (const std::string& doubt : series->doubts()) tables.warnings_.push_back(location + doubt);
+  const auto open = [&tables](const SeriesReference& file, std::span<const int> items) {
+    auto series = openTimeSeries(file, tables.reading_, items);
+    for (const std::string& doubt : series->doubts()) tables.warnings_.push_back(file.fileLocation + doubt);
     return series;
   };
-  for (std::size_t i = 0; i < observationLocations.size(); ++i) {
-    tables.observations_.push_back(open(tables.observationNames_[i], observationLocations[i], observationItems[i]));
+  for (std::size_t i = 0; i < observations.size(); ++i) {
+    tables.observations_.push_back(open(observations[i], observationItems[i]));
   }
-  for (std::size_t i = 0; i < simulationLocations.size(); ++i) {
-    tables.simulations_.push_back(open(tables.simulationNames_[i], simulationLocations[i], tables.simulationItems_[i]));
+  for (std::size_t i = 0; i < tables.simulationFiles_.size(); ++i) {
+    tables.simulations_.push_back(open(tables.simulationFiles_[i], tables.simulationItems_[i]));
     tables.usualSizes_.push_back(sizeOf(tables.simulationNames_[i]));
+    tables.toldDoubts_.push_back(tables.simulations_.back()->doubts().size());
   }
   tables.checkItems(measures, period, isForRuns);
   for (const OutputMeasure& measure : measures) {
@@ -314,7 +329,7 @@ void SeriesTables::warnOfMarkers(const ObservedSeries& observed, const OutputMea
       "{}: item No. {} ({}) is {} at {} of {} times in the evaluation period, and is compared there; if that marks "
       "missing values, {}",
       name, item, observation(observed.measure).itemName(item), static_cast<float>(marker), count,
-      observed.values.size(), howToMarkMissing(name, static_cast<float>(marker)));
+      observed.values.size(), howToMarkMissing(name, static_cast<float>(marker), measure.observation.form));
   addWarning(measure.observation.fileLocation, warning);
 }
 
@@ -337,10 +352,15 @@ std::optional<std::string> SeriesTables::tryOpenSimulationFiles(std::span<const 
   releaseSimulationFiles();
   for (std::size_t i = 0; i < paths.size(); ++i) {
     std::unique_ptr<TimeSeriesObject> series;
-    if (auto unusable =
-            tryOpen(std::string(trimTrailing(paths[i])), usualSizes_[i], simulationItems_[i], reading_, series)) {
+    if (auto unusable = tryOpen(std::string(trimTrailing(paths[i])), simulationFiles_[i], usualSizes_[i],
+                                simulationItems_[i], reading_, series)) {
       releaseSimulationFiles();
       return unusable;
+    }
+    // Whether columns cut a number depends on how long it is.
+    if (simulationFiles_[i].listing) {
+      const std::vector<std::string> doubts = series->doubts();
+      for (; toldDoubts_[i] < doubts.size(); ++toldDoubts_[i]) newDoubts_.push_back(doubts[toldDoubts_[i]]);
     }
     simulations_.push_back(std::move(series));
   }

@@ -5,6 +5,7 @@
 #include <optional>
 #include <span>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "measures/output_measure.h"
@@ -43,12 +44,15 @@ class SeriesTables final {
   /// the run.
   std::optional<std::string> tryOpenSimulationFiles(std::span<const std::string> paths);
   void releaseSimulationFiles();
+  /// What is doubtful in listings that were opened for evaluations, and was not in one before; told once.
+  std::vector<std::string> takeDoubts() { return std::exchange(newDoubts_, {}); }
   /// Limits how long files are read.
   ReadingWatch& watch();
   /// Ends the process that reads files of some formats, if there is one.
   void endHelper();
 
   const std::vector<std::string>& observationFileNames() const { return observationNames_; }
+  /// A listing that several measures read in different ways is there several times.
   const std::vector<std::string>& simulationFileNames() const { return simulationNames_; }
 
   /// The file of the measure with this 0-based index; simulation() may be called only between open and release.
@@ -92,22 +96,25 @@ class SeriesTables final {
 
   std::vector<std::string> observationNames_;
   std::vector<std::string> simulationNames_;
-  std::vector<std::size_t> observationIndex_;  ///< one per measure, 0-based
+  std::vector<SeriesReference> simulationFiles_;  ///< one per name: that of the measure that names it first
+  std::vector<std::size_t> observationIndex_;     ///< one per measure, 0-based
   std::vector<std::size_t> simulationIndex_;
   std::vector<bool> needsPairs_;                   ///< one per measure
   std::vector<ComparedItems> comparedItems_;       ///< one per measure
   std::vector<std::vector<int>> simulationItems_;  ///< one per simulation file: the item numbers in use
-  std::vector<std::uintmax_t> usualSizes_;         ///< one per simulation file: as it was found at the start
+  std::vector<std::size_t> toldDoubts_;            ///< one per simulation file: how many were told
+  std::vector<std::string> newDoubts_;
+  std::vector<std::uintmax_t> usualSizes_;  ///< one per simulation file: as it was found at the start
   std::shared_ptr<SeriesReading> reading_;
   std::vector<std::unique_ptr<TimeSeriesObject>> observations_;
   std::vector<std::unique_ptr<TimeSeriesObject>> simulations_;
   std::vector<std::string> warnings_;
 };
 
-/// Creates and opens one file, whose `items` will be read; `reading` may be null. Throws FatalError with "Error
-/// creating TS object for file: " or "Error opening TS object for file: " and the name; the detail holds the location,
-/// after `setupLocation`.
-std::unique_ptr<TimeSeriesObject> openTimeSeries(const std::string& fileName, const std::string& setupLocation = {},
+/// Creates and opens the file of the reference, of which `items` will be read; `reading` may be null. Throws FatalError
+/// with "Error creating TS object for file: " or "Error opening TS object for file: " and the name; the detail holds
+/// the location.
+std::unique_ptr<TimeSeriesObject> openTimeSeries(const SeriesReference& reference,
                                                  std::shared_ptr<SeriesReading> reading = nullptr,
                                                  std::span<const int> items = {});
 

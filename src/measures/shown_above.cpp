@@ -9,27 +9,32 @@
 
 #include "common/calendar.h"
 #include "common/text.h"
+#include "measures/item_names.h"
 #include "measures/measure_statistics.h"
 #include "measures/series_tables.h"
 
 namespace mirevo {
 namespace {
 
-std::unique_ptr<TimeSeriesObject> openShownAbove(const SeriesReference& reference) {
-  auto series = openTimeSeries(reference.fileName, reference.fileLocation, nullptr, std::span(&reference.itemNo, 1));
+/// `reference` has the number of its item afterwards, if it has a name.
+std::unique_ptr<TimeSeriesObject> openShownAbove(SeriesReference& reference) {
+  std::vector<int> items;  // an item of a name may be any
+  if (reference.itemName.empty()) items.push_back(reference.itemNo);
+  auto series = openTimeSeries(reference, nullptr, items);
+  reference.itemNo = itemNumber(*series, reference);
   requireItem(*series, reference);
   return series;
 }
 
 }  // namespace
 
-NamedSeries readShownAbove(const SeriesReference& reference, const EvaluationPeriod& period) {
+NamedSeries readShownAbove(SeriesReference reference, const EvaluationPeriod& period) {
   const auto series = openShownAbove(reference);
   return {series->itemName(reference.itemNo), readPeriodSeries(*series, reference, period)};
 }
 
 std::vector<std::string> requireShownAbove(const OutputMeasure& measure, const EvaluationPeriod& period) {
-  const SeriesReference& reference = measure.shownAbove;
+  SeriesReference reference = measure.shownAbove;
   if (reference.fileName.empty()) return {};
   const auto series = openShownAbove(reference);
   const std::string item = fmt::format("{}: item No. {} ({})", trimTrailing(reference.fileName), reference.itemNo,

@@ -14,7 +14,7 @@ struct NamedSeries {
 };
 
 /// Throws FatalError, with the texts for files of observations, if the file or the item cannot be read.
-NamedSeries readShownAbove(const SeriesReference& reference, const EvaluationPeriod& period);
+NamedSeries readShownAbove(SeriesReference reference, const EvaluationPeriod& period);
 
 /// Throws FatalError if the series that the measure has drawn above its hydrograph cannot be read. Returns what may not
 /// be meant, for warnings; nothing without such a series.

@@ -9,14 +9,14 @@
 
 namespace mirevo {
 
-ParameterFields parameterFields(ParameterModel& model, std::span<const int> widths) {
+ParameterFields parameterFields(ParameterModel& model, std::span<const ValueField> widest) {
   ParameterFields fields;
   std::vector<std::size_t> dependents;
-  for (std::size_t i = 0; i < widths.size(); ++i) {
+  for (std::size_t i = 0; i < widest.size(); ++i) {
     const ModelParameter& parameter = model.parameters()[i];
-    if (parameter.parameterType == ParameterType::variable) fields.widths.push_back(widths[i]);
-    if (parameter.parameterType != ParameterType::dependent || widths[i] == 0) continue;
-    fields.dependents.push_back({std::string(trimTrailing(parameter.name)), widths[i]});
+    if (parameter.parameterType == ParameterType::variable) fields.ofVariables.push_back(widest[i]);
+    if (parameter.parameterType != ParameterType::dependent || widest[i].width == 0) continue;
+    fields.dependents.push_back({std::string(trimTrailing(parameter.name)), widest[i]});
     dependents.push_back(i);
   }
   if (dependents.empty()) return fields;
@@ -34,14 +34,15 @@ ParameterFields parameterFields(ParameterModel& model, std::span<const int> widt
 std::vector<double> valuesAsWritten(const ParameterFields& fields, const SearchSpace& space,
                                     std::span<const double> set) {
   std::vector<double> written;
-  const auto add = [&written](double value, int width) {
-    if (width > 0) written.push_back(valueAsWritten(value, width).value_or(std::numeric_limits<double>::infinity()));
+  const auto add = [&written](double value, ValueField field) {
+    if (field.width > 0)
+      written.push_back(valueAsWritten(value, field).value_or(std::numeric_limits<double>::infinity()));
   };
   const std::vector<double> values = ToModelScale(space, set);
-  for (std::size_t j = 0; j < values.size(); ++j) add(values[j], fields.widthOf(j));
+  for (std::size_t j = 0; j < values.size(); ++j) add(values[j], fields.fieldOf(j));
   if (fields.dependentValues) {
     const std::vector<double> ofDependents = fields.dependentValues(set);
-    for (std::size_t i = 0; i < ofDependents.size(); ++i) add(ofDependents[i], fields.dependents[i].width);
+    for (std::size_t i = 0; i < ofDependents.size(); ++i) add(ofDependents[i], fields.dependents[i].field);
   }
   return written.empty() ? values : written;
 }

@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "parameters/parameter_model.h"
+#include "parameters/value_format.h"
 
 namespace mirevo {
 
@@ -13,16 +14,18 @@ namespace mirevo {
 struct ParameterFields {
   struct Dependent {
     std::string name;
-    int width = 0;
+    ValueField field = 0;
   };
 
-  /// One per variable parameter, in characters; 0 or no entry: it has no field.
-  std::vector<int> widths = {};
+  /// One per variable parameter; of width 0, or no entry: it has no field.
+  std::vector<ValueField> ofVariables = {};
   std::vector<Dependent> dependents = {};  ///< those that have a field
   /// The values of `dependents` for a set (search scale), on the model scale; empty for a set that cannot be run.
   std::function<std::vector<double>(std::span<const double> set)> dependentValues = {};
 
-  int widthOf(std::size_t variable) const { return variable < widths.size() ? widths[variable] : 0; }
+  ValueField fieldOf(std::size_t variable) const {
+    return variable < ofVariables.size() ? ofVariables[variable] : ValueField();
+  }
 };
 
 /// What the model reads of a set (search scale): the values in all fields as they are written there, infinite where a
@@ -30,8 +33,8 @@ struct ParameterFields {
 std::vector<double> valuesAsWritten(const ParameterFields& fields, const SearchSpace& space,
                                     std::span<const double> set);
 
-/// The fields of the model's parameters, by `widths` of one entry per parameter of any type. The model must outlive
+/// The fields of the model's parameters, by `widest`, of one entry per parameter of any type. The model must outlive
 /// them.
-ParameterFields parameterFields(ParameterModel& model, std::span<const int> widths);
+ParameterFields parameterFields(ParameterModel& model, std::span<const ValueField> widest);
 
 }  // namespace mirevo

@@ -18,8 +18,8 @@ constexpr int kSignificantDigits = 4;
 /// In a range that includes 0, values smaller than this fraction of the larger bound are negligible.
 constexpr double kNegligible = 1.0e-3;
 
-bool keepsDigits(double value, int width) {
-  const std::optional<double> written = valueAsWritten(value, width);
+bool keepsDigits(double value, ValueField field) {
+  const std::optional<double> written = valueAsWritten(value, field);
   if (!written) return false;
   if (value == 0.0 || *written == value) return true;
   const double unit = std::pow(10.0, std::floor(std::log10(std::abs(value))) - (kSignificantDigits - 1));
@@ -67,16 +67,19 @@ std::vector<double> samplesOf(const ModelParameter& parameter) {
 
 }  // namespace
 
-std::string describePrecisionLoss(const ModelParameter& parameter, int width) {
+std::string describePrecisionLoss(const ModelParameter& parameter, ValueField field) {
+  const int width = field.width;
   const std::vector<double> samples = samplesOf(parameter);
-  const auto keepsAll = [&samples](int candidate) {
-    return std::all_of(samples.begin(), samples.end(), [candidate](double v) { return keepsDigits(v, candidate); });
+  const auto keepsAll = [&samples, form = field.form](int candidate) {
+    return std::all_of(samples.begin(), samples.end(), [candidate, form](double v) {
+      return keepsDigits(v, {candidate, form});
+    });
   };
-  const auto lost = std::find_if(samples.begin(), samples.end(), [width](double v) { return !keepsDigits(v, width); });
+  const auto lost = std::find_if(samples.begin(), samples.end(), [field](double v) { return !keepsDigits(v, field); });
   if (lost == samples.end()) return {};
   std::string text =
       fmt::format(" is {} characters wide and keeps fewer than four significant digits: {} is written as \"{}\"", width,
-                  formatReal(*lost), FormatValueForPlaceholder(*lost, width));
+                  formatReal(*lost), FormatValueForPlaceholder(*lost, field));
   int enough = width + 1;
   while (enough <= kMaximumValueWidth && !keepsAll(enough)) ++enough;
   if (enough > kMaximumValueWidth) return text + "; no width is enough";

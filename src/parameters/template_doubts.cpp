@@ -93,14 +93,15 @@ std::vector<std::string> templateDoubts(const ParameterTemplate& parameterTempla
                       name, found->line, quotedForMessage(found->marked)));
     }
   } else {
-    if (const std::string_view behind = behindDelimiter(text); !behind.empty()) {
+    const auto ofPest = delimiterOfPest(text.substr(0, text.find('\n')));
+    if (const std::string_view behind = behindDelimiter(text); !behind.empty() && !ofPest) {
       doubts.push_back(
           fmt::format("{}:1: the first line holds the delimiter, {}, and does not reach the model: {} "
                       "behind it is ignored{}",
                       name, quotedForMessage(std::string_view(behind.data() - 1, 1)), quotedForMessage(trim(behind)),
                       lacksDelimiterLine(text, parameters) ? "; was a line for the delimiter forgotten?" : ""));
     }
-    const char delimiter = delimiterOf(text);
+    const char delimiter = ofPest ? *ofPest : delimiterOf(text);
     if (const auto found = findMarkedName(text, parameters, delimiter)) {
       doubts.push_back(fmt::format("{}:{}: {} is copied as it is: the delimiter in the first line is {}", name,
                                    found->line, quotedForMessage(found->marked), delimiter));

@@ -27,11 +27,13 @@ bool isDigit(char c) {
 
 /// The delimiter in the first line of a template.
 char readDelimiter(std::string_view templateName, std::string_view line) {
+  const auto ofPest = delimiterOfPest(line);
   takeText(line, kByteOrderMark);
   line = trim(line);
   const auto refuse = [templateName](std::string_view reason) {
     fatalError(fmt::format("Error: Delimiter not defined in template file {}", templateName), reason);
   };
+  if (ofPest) line = line.substr(line.size() - 1);
   if (line.empty()) refuse("the first line of a template holds the character that opens and closes a placeholder");
   const char delimiter = line.front();
   if (isDigit(delimiter) || std::string_view("+-.E").find(delimiter) != std::string_view::npos) {
@@ -44,10 +46,11 @@ char readDelimiter(std::string_view templateName, std::string_view line) {
 }
 
 /// Index of the first parameter with this name, without trailing blanks; the number of parameters if there is none.
-std::size_t findParameter(std::string_view asWritten, std::span<const ModelParameter> parameters) {
+std::size_t findParameter(std::string_view asWritten, std::span<const ModelParameter> parameters, bool ignoresCase) {
   const std::string name = decodeText(asWritten).text;  // a template may be Latin-1; the setup is UTF-8 here
-  const auto found = std::find_if(parameters.begin(), parameters.end(), [name](const ModelParameter& parameter) {
-    return trimBlanks(parameter.name) == name;
+  const auto found = std::find_if(parameters.begin(), parameters.end(), [&](const ModelParameter& parameter) {
+    const std::string_view known = trimBlanks(parameter.name);
+    return ignoresCase ? equalIgnoringCase(known, name) : known == name;
   });
   return static_cast<std::size_t>(found - parameters.begin());
 }
@@ -88,26 +91,28 @@ ParameterTemplate::ParameterTemplate(std::string_view templateName, std::string_
                                      std::span<const ModelParameter> parameters, bool isConverted)
     : templateName_(templateName), pieces_(1) {
   const std::vector<std::string_view> lines = templateLines(templateName, text);
-  const char delimiter = readDelimiter(templateName, lines.empty() ? std::string_view{} : lines.front());
+  const std::string_view head = lines.empty() ? std::string_view{} : lines.front();
+  delimiter_ = readDelimiter(templateName, head);
+  isOfPest_ = delimiterOfPest(head).has_value();
   for (std::size_t i = 1; i < lines.size(); ++i) {
-    takeLine(lines[i], static_cast<int>(i) + (isConverted ? 0 : 1), delimiter, parameters);
+    takeLine(lines[i], static_cast<int>(i) + (isConverted ? 0 : 1), parameters);
   }
 }
 
-void ParameterTemplate::takeLine(std::string_view line, int lineNumber, char delimiter,
-                                 std::span<const ModelParameter> parameters) {
+void ParameterTemplate::takeLine(std::string_view line, int lineNumber, std::span<const ModelParameter> parameters) {
   std::size_t copied = 0;
-  for (std::size_t open = line.find(delimiter); open != std::string_view::npos; open = line.find(delimiter, copied)) {
-    const std::size_t close = line.find(delimiter, open + 1);
+  for (std::size_t open = line.find(delimiter_); open != std::string_view::npos; open = line.find(delimiter_, copied)) {
+    const std::size_t close = line.find(delimiter_, open + 1);
     const bool paired = close != std::string_view::npos;
-    const std::string_view name = paired ? trimBlanks(line.substr(open + 1, close - open - 1)) : std::string_view{};
-    const std::size_t parameter = name.empty() ? parameters.size() : findParameter(name, parameters);
+    std::string_view name = paired ? trimBlanks(line.substr(open + 1, close - open - 1)) : std::string_view{};
+    if (isOfPest_) name = trim(name);
+    const std::size_t parameter = name.empty() ? parameters.size() : findParameter(name, parameters, isOfPest_);
     if (parameter == parameters.size()) {
-      failUnknownName(templateName_, lineNumber, open, paired, delimiter, name, parameters);
+      failUnknownName(templateName_, lineNumber, open, paired, delimiter_, name, parameters);
     }
     pieces_.back() += line.substr(copied, open - copied);
-    placeholders_.push_back(
-        {parameter, static_cast<int>(characterCount(line.substr(open, close - open + 1))), lineNumber});
+    const auto width = static_cast<int>(characterCount(line.substr(open, close - open + 1)));
+    placeholders_.push_back({parameter, {width, isOfPest_ ? ValueForm::rounded : ValueForm::cut}, lineNumber});
     pieces_.emplace_back();
     copied = close + 1;
   }
@@ -119,7 +124,7 @@ std::string ParameterTemplate::fill(std::span<const double> modelValues) const {
   std::string content = pieces_.front();
   for (std::size_t i = 0; i < placeholders_.size(); ++i) {
     assert(placeholders_[i].parameter < modelValues.size());
-    content += FormatValueForPlaceholder(modelValues[placeholders_[i].parameter], placeholders_[i].width);
+    content += FormatValueForPlaceholder(modelValues[placeholders_[i].parameter], placeholders_[i].field);
     // Removes the blanks after the value of a wide placeholder at the end of a line.
     if (pieces_[i + 1].starts_with('\n')) trimBlanksAtEnd(content);
     content += pieces_[i + 1];
@@ -130,7 +135,8 @@ std::string ParameterTemplate::fill(std::span<const double> modelValues) const {
 std::string ParameterTemplate::unwritableValue(std::span<const double> modelValues,
                                                std::span<const ModelParameter> parameters) const {
   const auto found = std::find_if(placeholders_.begin(), placeholders_.end(), [modelValues](const Placeholder& one) {
-    return !isWritable(modelValues[one.parameter]);
+    const double value = modelValues[one.parameter];
+    return one.field.form == ValueForm::cut ? !isWritable(value) : !valueAsWritten(value, one.field);
   });
   if (found == placeholders_.end()) return {};
   return fmt::format("the value {} of parameter \"{}\" cannot be written in its field, {}:{}",
@@ -146,10 +152,10 @@ std::vector<std::size_t> ParameterTemplate::parametersNamed() const {
   return indices;
 }
 
-void ParameterTemplate::raiseToWidest(std::vector<int>& widths) const {
+void ParameterTemplate::raiseToWidest(std::vector<ValueField>& fields) const {
   for (const Placeholder& placeholder : placeholders_) {
-    int& width = widths[placeholder.parameter];
-    width = std::max(width, placeholder.width);
+    ValueField& field = fields[placeholder.parameter];
+    if (placeholder.field.width > field.width) field = placeholder.field;
   }
 }
 
@@ -161,7 +167,7 @@ std::vector<std::string> ParameterTemplate::narrowPlaceholderWarnings(
     const ModelParameter& parameter = parameters[placeholder.parameter];
     const std::string where = fmt::format("{}:{}: the placeholder of parameter \"{}\"", templateName_, placeholder.line,
                                           trimTrailing(parameter.name));
-    if (const std::string loss = describePrecisionLoss(parameter, placeholder.width); !loss.empty()) {
+    if (const std::string loss = describePrecisionLoss(parameter, placeholder.field); !loss.empty()) {
       warnings.push_back(where + loss);
     }
     const std::string& before = pieces_[i];
@@ -179,10 +185,10 @@ std::vector<std::string> ParameterTemplate::narrowPlaceholderWarnings(
   return warnings;
 }
 
-std::vector<int> widestPlaceholders(std::span<const ParameterTemplate> templates, std::size_t parameterCount) {
-  std::vector<int> widths(parameterCount, 0);
-  for (const ParameterTemplate& each : templates) each.raiseToWidest(widths);
-  return widths;
+std::vector<ValueField> widestPlaceholders(std::span<const ParameterTemplate> templates, std::size_t parameterCount) {
+  std::vector<ValueField> fields(parameterCount);
+  for (const ParameterTemplate& each : templates) each.raiseToWidest(fields);
+  return fields;
 }
 
 void WriteParameterFile(const std::string& path, const ParameterTemplate& parameterTemplate,

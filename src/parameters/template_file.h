@@ -10,6 +10,7 @@
 
 #include "common/settings/code_name.h"
 #include "parameters/model_parameter.h"
+#include "parameters/value_format.h"
 
 namespace mirevo {
 
@@ -47,12 +48,14 @@ std::optional<FoundIdValue> findIdValue(std::string_view text, std::span<const M
 std::string ConvertIdTemplate(std::string_view templateName, std::string_view text,
                               std::span<const ModelParameter> parameters);
 
-/// A delimiter template, split into pieces once, so that writing a parameter file takes one pass over them.
+/// A delimiter template, or one of PEST (`ptf ~` in its first line), split into pieces once, so that writing a
+/// parameter file takes one pass over them.
 class ParameterTemplate final {
  public:
   /// Throws FatalError for a text without a delimiter in its first line, for a placeholder that names no parameter, and
   /// for a line that is too long. If several parameters have the same name, the first is taken; trailing blanks of a
-  /// name do not count. For a converted template line numbers in messages do not count the added delimiter line.
+  /// name do not count; in a template of PEST blanks before a name and letter case do not, either. For a converted
+  /// template line numbers in messages do not count the added delimiter line.
   ParameterTemplate(std::string_view templateName, std::string_view text, std::span<const ModelParameter> parameters,
                     bool isConverted = false);
 
@@ -68,8 +71,8 @@ class ParameterTemplate final {
   /// 0-based indices of the parameters that the template names, ascending, each once.
   std::vector<std::size_t> parametersNamed() const;
 
-  /// Raises `widths`, one entry per parameter, to those of the placeholders.
-  void raiseToWidest(std::vector<int>& widths) const;
+  /// Replaces `fields`, one per parameter, by wider placeholders.
+  void raiseToWidest(std::vector<ValueField>& fields) const;
 
   /// One warning per placeholder in which values between the parameter's bounds keep fewer than four significant
   /// digits, with the width to use, and one per placeholder next to a digit or sign, since the model may read both as
@@ -79,18 +82,20 @@ class ParameterTemplate final {
  private:
   struct Placeholder {
     std::size_t parameter = 0;  ///< 0-based
-    int width = 0;              ///< delimiters included
-    int line = 0;               ///< in the template, from 1
+    ValueField field = 0;
+    int line = 0;  ///< in the template, from 1
   };
-  void takeLine(std::string_view line, int lineNumber, char delimiter, std::span<const ModelParameter> parameters);
+  void takeLine(std::string_view line, int lineNumber, std::span<const ModelParameter> parameters);
 
   std::string templateName_;
+  char delimiter_ = '\0';
+  bool isOfPest_ = false;
   std::vector<std::string> pieces_;  ///< text before, between and after the placeholders
   std::vector<Placeholder> placeholders_;
 };
 
-/// By parameter, the width of its widest placeholder in any of the templates; 0: it has none.
-std::vector<int> widestPlaceholders(std::span<const ParameterTemplate> templates, std::size_t parameterCount);
+/// By parameter, its widest placeholder in any of the templates; of width 0: it has none.
+std::vector<ValueField> widestPlaceholders(std::span<const ParameterTemplate> templates, std::size_t parameterCount);
 
 /// Rewrites an existing parameter file, keeping its mode. Throws FatalError with "Error: Unable to open " and the path,
 /// and the system's reason below.

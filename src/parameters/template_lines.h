@@ -1,5 +1,6 @@
 #pragma once
 
+#include <optional>
 #include <string_view>
 #include <vector>
 
@@ -10,6 +11,10 @@ std::vector<std::string_view> templateLines(std::string_view templateName, std::
 
 /// Throws FatalError: line `lineNumber` (from 1) has `length` characters.
 [[noreturn]] void failLongLine(std::string_view templateName, std::size_t lineNumber, std::size_t length);
+
+/// The delimiter of a template of PEST: the one character behind `ptf` in its first line. Nothing for the first
+/// line of another template.
+std::optional<char> delimiterOfPest(std::string_view firstLine);
 
 /// `text` without trailing blanks; tabs are kept, as the model may count columns by them.
 std::string_view trimBlanks(std::string_view text);

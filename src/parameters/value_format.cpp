@@ -57,10 +57,71 @@ std::optional<std::string> exponentForm(double value, std::size_t width) {
   return text + exponent;
 }
 
+/// The fewest significant digits that tell the value from all others.
+int digitsOf(double value) {
+  constexpr int kEnough = 17;
+  int digits = 1;
+  while (digits < kEnough && parseReal(fmt::format("{:.{}e}", value, digits - 1)) != value) ++digits;
+  return digits;
+}
+
+/// The value with that many significant digits, in the fixed form or, where that is longer than `width`, in the
+/// shortest one with an exponent; empty if neither fits. A model that reads fixed columns would misread a number
+/// without a point.
+std::optional<std::string> roundedForm(double value, int digits, std::size_t width) {
+  const std::string text = fmt::format("{:.{}e}", std::abs(value), digits - 1);
+  const std::size_t mark = text.find('e');
+  const int exponent = parseInteger(text.substr(mark + 1)).value();
+  std::string figures = text.substr(0, 1);
+  if (mark > 2) figures += text.substr(2, mark - 2);
+  const std::string sign = value < 0.0 ? "-" : "";
+
+  constexpr int kLongestFixed = 40;  // of zeros on either side
+  if (std::abs(exponent) < kLongestFixed) {
+    std::string whole;
+    std::string part;
+    if (exponent < 0) {
+      part = std::string(static_cast<std::size_t>(-exponent - 1), '0') + figures;
+    } else {
+      const auto places = static_cast<std::size_t>(exponent) + 1;
+      whole = figures.substr(0, places);
+      whole.resize(places, '0');
+      if (figures.size() > places) part = figures.substr(places);
+    }
+    for (const std::string& fixed : {fmt::format("{}.{}", whole.empty() ? "0" : whole, part.empty() ? "0" : part),
+                                     fmt::format("{}.{}", whole, part)}) {
+      if (sign.size() + fixed.size() <= width) return sign + fixed;
+    }
+  }
+  const std::string part = figures.size() > 1 ? figures.substr(1) : std::string();
+  for (const std::string& power :
+       {fmt::format("E{}{:02}", exponent < 0 ? '-' : '+', std::abs(exponent)), fmt::format("E{}", exponent)}) {
+    const std::string scaled = fmt::format("{}{}.{}{}", sign, figures.front(), part, power);
+    if (scaled.size() <= width) return scaled;
+  }
+  return std::nullopt;
+}
+
+std::string formatRounded(double value, std::size_t width) {
+  std::optional<std::string> text;
+  if (std::isfinite(value)) {
+    for (int digits = digitsOf(value); digits > 0 && !text; --digits) text = roundedForm(value, digits, width);
+  }
+  std::string field(width, ' ');
+  if (text) {
+    std::copy(text->begin(), text->end(), field.end() - std::ssize(*text));
+  } else {
+    field.front() = kUnwritable;
+  }
+  return field;
+}
+
 }  // namespace
 
-std::string FormatValueForPlaceholder(double value, int width) {
+std::string FormatValueForPlaceholder(double value, ValueField placeholder) {
+  const int width = placeholder.width;
   if (width <= 0) return {};
+  if (placeholder.form == ValueForm::rounded) return formatRounded(value, static_cast<std::size_t>(width));
   std::string field(static_cast<std::size_t>(width), ' ');
   const int w = std::min(width, kMaximumValueWidth);
   const double upper = static_cast<double>(kPowersOfTen[w - 1] - 1.0F);
@@ -88,8 +149,8 @@ bool isWritable(double value) {
   return FormatValueForPlaceholder(value, kMaximumValueWidth).front() != kUnwritable;
 }
 
-std::optional<double> valueAsWritten(double value, int width) {
-  return parseReal(FormatValueForPlaceholder(value, width));
+std::optional<double> valueAsWritten(double value, ValueField field) {
+  return parseReal(FormatValueForPlaceholder(value, field));
 }
 
 }  // namespace mirevo

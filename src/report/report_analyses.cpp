@@ -51,8 +51,8 @@ StoredResults resultsOf(const RunConfig& config, const SearchSpace& space, std::
   return {space, std::move(records), std::move(missing)};
 }
 
-/// The widths of the placeholders as the run had them; a template that is no longer there has none.
-std::vector<int> fieldWidths(const RunConfig& config) {
+/// The placeholders as the run had them; a template that is no longer there has none.
+std::vector<ValueField> widestFields(const RunConfig& config) {
   std::vector<ParameterTemplate> templates;
   for (const ParameterFileItem& item : config.parameterFiles) {
     try {
@@ -174,7 +174,7 @@ std::optional<ReportedSensitivity> reportedSensitivity(const RunConfig& config, 
   StoredResults evaluator = resultsOf(config, space, rows, pairs);
   ParameterModel parameters(config.parameters, config.constraints);
   const LocalSensitivity found =
-      localSensitivity(settings, space, evaluator, parameterFields(parameters, fieldWidths(config)),
+      localSensitivity(settings, space, evaluator, parameterFields(parameters, widestFields(config)),
                        parameters.feasibility(), config.objectives, config.measures);
   ReportedSensitivity reported;
   reported.parameters = space.names;

@@ -391,6 +391,12 @@ void ReportBuilder::addSeries() {
     }
   }
   data_.series.series = std::move(series);
+  if (const std::size_t others = pairsShownWithOthers(config_.measures); others > 0) {
+    note(fmt::format(
+        "Of {} pairs of series {} are shown: of measures that compare the same items in the same way, with other "
+        "observations or weights, the first.",
+        shown.size() + others, shown.size()));
+  }
   addScenarios(names, shown);
   if (!data_.series.initial) {
     note(fmt::format("The series of the initial evaluation are not shown: {} does not have them.", source.file));

@@ -29,6 +29,8 @@ constexpr std::string_view kShortHelpQuestion = "-h";
 constexpr std::array<std::string_view, 4> kQuestions = {kHelpQuestion, kShortHelpQuestion, "--version",
                                                         kKeywordQuestion};
 
+constexpr std::array<std::string_view, 2> kCommands = {"--new", "--check"};
+
 std::string listOf(std::span<const std::string> arguments) {
   std::string list;
   for (const std::string& argument : arguments) {
@@ -88,6 +90,30 @@ std::optional<ProgramQuestion> CommandLine::question(const std::function<bool(co
         fmt::format("Ignored: {}; {} is answered, and nothing is run", listOf(others), question.name));
   }
   return question;
+}
+
+std::optional<ProgramCommand> CommandLine::command(const std::function<bool(const std::string&)>& isFile) const {
+  std::vector<std::string> others = ordinaryArguments();
+  const auto given = std::find_first_of(others.begin(), others.end(), kCommands.begin(), kCommands.end());
+  if (given == others.end() || (given == others.end() - 1 && isFile(*given))) return std::nullopt;
+  ProgramCommand command{*given, {}, {}};
+  others.erase(given);
+  if (!others.empty()) {
+    command.argument = trim(others.back());
+    others.pop_back();
+  }
+  std::copy_if(arguments_.begin(), arguments_.end(), std::back_inserter(others), isSwitch);
+  if (!others.empty()) command.ignored.push_back(fmt::format("Ignored: {}; no run is made", listOf(others)));
+  return command;
+}
+
+std::optional<std::pair<std::string, std::string>> CommandLine::mistypedCommand() const {
+  const std::vector<std::string> commands(kCommands.begin(), kCommands.end());
+  for (const std::string& argument : ordinaryArguments()) {
+    if (!argument.starts_with("--") || argument == getArgument(countArguments() - 1)) continue;
+    if (const auto meant = nearestName(argument, commands)) return std::pair(argument, *meant);
+  }
+  return std::nullopt;
 }
 
 std::vector<std::string> CommandLine::ignored() const {

@@ -5,6 +5,7 @@
 #include <span>
 #include <string>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 namespace mirevo {
@@ -13,6 +14,13 @@ namespace mirevo {
 struct ProgramQuestion {
   std::string name;                  ///< "--help", "--version" or "--keyword"
   std::string keyword;               ///< what --keyword asks for; empty: all
+  std::vector<std::string> ignored;  ///< a sentence about what else is on the command line
+};
+
+/// Something other than a run that the program is asked to do.
+struct ProgramCommand {
+  std::string name;                  ///< "--new" or "--check"
+  std::string argument;              ///< the folder or the setup file; empty: none
   std::vector<std::string> ignored;  ///< a sentence about what else is on the command line
 };
 
@@ -35,6 +43,14 @@ class CommandLine final {
   /// The question that is asked, the last one if there are several. None if the last ordinary argument is a file, as
   /// `isFile` says: then it is the setup file, whatever it is called.
   std::optional<ProgramQuestion> question(const std::function<bool(const std::string&)>& isFile) const;
+
+  /// The command that is given, the first one if there are several. None if it is the last ordinary argument and a
+  /// file, as `isFile` says.
+  std::optional<ProgramCommand> command(const std::function<bool(const std::string&)>& isFile) const;
+
+  /// An argument before the setup file that can only be a mistyped command, and the command. A run in its place would
+  /// touch the results.
+  std::optional<std::pair<std::string, std::string>> mistypedCommand() const;
 
   /// What else is on the command line and has no effect, a sentence each: other ordinary arguments, unknown switches.
   std::vector<std::string> ignored() const;

@@ -17,8 +17,10 @@
 #include "platform/jobs/mpi_module.h"
 #include "platform/terminal/front_end.h"
 #include "report/library_versions.h"
+#include "run/new_setup.h"
 #include "run/run_driver.h"
 #include "run/setup/keyword_help.h"
+#include "run/setup_check.h"
 #include "run/signal_handlers.h"
 #include "run/stop_run.h"
 #include "viewer/qmon_start.h"
@@ -32,6 +34,9 @@ constexpr std::string_view kHelp = R"(
 Calibrates and analyses a simulation model as the setup file (KDX format) says.
 
   //qmon           shows the run's progress on this terminal
+  --check SETUP    reads and checks the setup, runs the model once with the
+                   initial values, shows what was read and computed, and stops
+  --new [FOLDER]   writes a small setup that runs, with its model and data
   --keyword        names every keyword of a setup, as SECTION/Keyword
   --keyword NAME   explains a keyword or a section
   --version        prints the version, and what the program was built with
@@ -42,9 +47,9 @@ the results of every evaluation. VOLK_PROGRESS=STDOUT prints the run's messages
 here; creating the file <setup>._kill_ cancels the run. On a terminal the run
 shows a line about itself, unless VOLK_PROGRESS=NONE.
 
-Exit codes: 0 after a normal termination or an answer; 1 after an error, a
-cancelled run or a command line that is refused; 128 + the signal's number after
-a signal.
+Exit codes: 0 after a normal termination, an answer or a check that found
+nothing wrong; 1 after an error, a cancelled run or a command line that is
+refused; 128 + the signal's number after a signal.
 )";
 
 /// Whether an argument is the setup file and no question. A keyword's name is not, where it follows --keyword.
@@ -74,6 +79,14 @@ int answer(const ProgramQuestion& question) {
   return writeAnswer(text);
 }
 
+/// Does what is asked instead of a run; returns the exit code.
+int obey(const ProgramCommand& command) {
+  if (command.name == "--new") return writeNewSetup(command.argument);
+  if (!command.argument.empty()) return checkSetup(command.argument);
+  showMessage("Usage: Mirevo --check kdx-file");
+  return 1;
+}
+
 /// Whether it can only be meant as an option, which would otherwise be taken for the name of a setup.
 bool isUnknownOption(const std::string& argument) {
   std::error_code ignored;
@@ -99,13 +112,14 @@ void occupyStandardDescriptors(int access) {
 
 void processStart(int argc, char** argv) {
   const CommandLine commandLine(argc, argv);
-  occupyStandardDescriptors(commandLine.question(isSetup) ? O_RDONLY : O_RDWR);
+  const bool isRun = !commandLine.question(isSetup) && !commandLine.command(isSetup);
+  occupyStandardDescriptors(isRun ? O_RDWR : O_RDONLY);
   if (!commandLine.wantsProgressViewer()) runWithFrontEnd("G48=WIN", commandLine);
   const auto run = [&commandLine] { runWithFrontEnd("G48=QMON", commandLine); };
   const std::string setupFileName(commandLine.setupFileName());
   // A job launcher watches the processes that it started, so the run must stay in this one.
   const bool isPartOfJob = launcherRank() >= 0;
-  if (setupFileName.empty() || commandLine.question(isSetup) || isUnknownOption(setupFileName) || isPartOfJob) run();
+  if (!isRun || setupFileName.empty() || isUnknownOption(setupFileName) || isPartOfJob) run();
   const auto prepare = [] {
     ::setenv("G48", "QMON", 1);
     installSignalHandlers();
@@ -127,6 +141,17 @@ void mirevoMain(const CommandLine& commandLine) {
   if (const auto question = commandLine.question(isSetup)) {
     if (answers) showIgnored(question->ignored);
     stopRun(answers ? answer(*question) : 0);  // a launcher that sees this process fail would end the one that answers
+  }
+  if (const auto command = commandLine.command(isSetup)) {
+    if (!answers) stopRun(0);
+    showIgnored(command->ignored);
+    stopRun(obey(*command));
+  }
+  if (const auto mistyped = commandLine.mistypedCommand()) {
+    if (!answers) stopRun(0);
+    showMessage(
+        fmt::format("Unknown option {}; did you mean {}?", quotedForMessage(mistyped->first), mistyped->second));
+    stopRun(1);
   }
   if (setupFileName.empty() || isUnknownOption(setupFileName)) {
     if (!answers) stopRun(0);

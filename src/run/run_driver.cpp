@@ -13,7 +13,6 @@
 #include "common/clock.h"
 #include "common/fatal_error.h"
 #include "common/file_lock.h"
-#include "common/files.h"
 #include "common/progress_messages.h"
 #include "common/replaceable_files.h"
 #include "common/run_files.h"
@@ -35,7 +34,6 @@
 #include "run/run_series.h"
 #include "run/setup/setup_reader.h"
 #include "run/setup/setup_summary.h"
-#include "run/setup/setup_warnings.h"
 #include "run/signal_handlers.h"
 #include "run/stop_run.h"
 #include "run/worker_run.h"
@@ -118,19 +116,8 @@ void RunDriver::openRun(const std::string& setupFileName) {
   installSignalHandlers();
   const SetupLocation setup = locateSetup(setupFileName);
   filePrefix_ = setup.folder + "/" + setup.name;
+  requireSetupFile(setup);
   std::error_code ignored;
-  if (const std::string fault = faultOfFile(setup.folder); fault == std::strerror(ENOENT)) {
-    fatalError("Error: Unable to open " + setup.file, fmt::format("there is no folder {}", setup.folder));
-  } else if (fault.empty()) {
-    fatalError("Error: Unable to open " + setup.file, fmt::format("{} is a file and no folder", setup.folder));
-  }
-  if (const std::string fault = faultOfFile(setup.file);
-      !fault.empty() && std::filesystem::exists(setup.file, ignored)) {
-    fatalError("Error: Unable to open " + setup.file, fault);  // before files are created beside it: it may be in /dev
-  } else if (const std::string meant = setup.file + ".kdx"; !fault.empty() && faultOfFile(meant).empty()) {
-    // The run's files would be those of that setup, of which a run may be going on.
-    fatalError("Error: Unable to open " + setup.file, fmt::format("{}; did you mean {}?", fault, meant));
-  }
   if (!runLock_.take(runFilePath(filePrefix_, run_files::kRunLock), {}, kLockPatienceSeconds)) {
     fatalError(kAnotherRun,
                fmt::format("{}: another run{} writes the files {}*. Wait for it, or run a copy under another name.",
@@ -234,23 +221,17 @@ void RunDriver::tellOfFolders(const FoldersMade& made) {
 void RunDriver::logSetup() {
   state_.log.line("");
   state_.log.line(setupSummary(config_, parameters_->searchSpace(), parameters_->evaluationOrder()));
-  if (config_.task) {
-    for (const std::string& text : config_.task->warnings(parameters_->searchSpace())) state_.log.warning(text);
-  }
-  for (const std::string& text : runner_->warnings()) state_.log.warning(text);
-  for (const std::string& text : runner_->output().warnings()) state_.log.warning(text);
-  for (const std::string& text :
-       unusedParameterWarnings(config_.parameters, config_.constraints, runner_->templates())) {
-    state_.log.warning(text);
-  }
-  for (const ParameterTemplate& parameterTemplate : runner_->templates()) {
-    for (const std::string& text : parameterTemplate.narrowPlaceholderWarnings(config_.parameters)) {
-      state_.log.warning(text);
-    }
-  }
+  for (const std::string& text : modelDoubts(config_, *parameters_, *runner_)) state_.log.warning(text);
   if (state_.job->hasWorkers()) {
+    const int workers = state_.job->processCount() - 1;
     state_.log.line(fmt::format("{} job: this master and {} workers, each of which runs one model at a time",
-                                state_.job->means(), state_.job->processCount() - 1));
+                                state_.job->means(), workers));
+    if (const int mostUsed = config_.mostAtOnce(); mostUsed < workers) {
+      state_.log.warning(
+          fmt::format("Only {} can be used by the evaluations of this run, once the initial sample is "
+                      "done",
+                      countText(static_cast<std::size_t>(mostUsed), "worker")));
+    }
     if (config_.maxWorkerSilence > 0.0) {
       state_.log.line(fmt::format("The set of a worker that gives no sign of life for {:g} s goes to another one",
                                   config_.maxWorkerSilence));
@@ -278,6 +259,7 @@ void RunDriver::openResults() {
   scenarioSeries_ = openScenarioSeries(config_, runner_->output(), runFilePath(filePrefix_, run_files::kScenarioSeries),
                                        earlier != nullptr, state_.log);
   if (scenarioSeries_) reporter_->recordScenarios(*scenarioSeries_);
+  openHook();
   failedRunPolicy_.emplace(config_.plannedEvaluations(), config_.failedRunFolders);
   if (state_.job->hasWorkers()) {
     state_.workers.emplace(*state_.job, config_.maxWorkerSilence, state_.clock);
@@ -287,6 +269,44 @@ void RunDriver::openResults() {
     evaluator_ = std::make_unique<LocalEvaluator>(*runner_, *reporter_, *failedRunPolicy_,
                                                   config_.simultaneousSimulations, earlier, &slotUse_);
   }
+}
+
+void RunDriver::openHook() {
+  if (trim(config_.improvementCommand).empty()) return;
+  hook_ = std::make_unique<ImprovementHook>(config_, state_.log);
+  reporter_->followBest(
+      [this](const EvaluationResult& result) {
+        hook_->improved(hookValues(resultRow(reporter_->best()->parameterValues, result)));
+      },
+      [this] { hook_->look(); });
+}
+
+HookValues RunDriver::hookValues(const ResultRow& row) const {
+  HookValues values{row.number, row.aggregate, {}, {}, {}};
+  const std::vector<double> all = allModelValues(*parameters_, row.parameters);
+  for (std::size_t i = 0; i < all.size(); ++i) values.parameters.emplace_back(config_.parameters[i].name, all[i]);
+  for (std::size_t i = 0; i < row.measures.size(); ++i) {
+    values.measures.emplace_back(config_.measures[i].name, row.measures[i]);
+  }
+  for (std::size_t i = 0; i < row.objectives.size(); ++i) {
+    values.objectives.emplace_back(config_.objectives[i].name, row.objectives[i]);
+  }
+  return values;
+}
+
+void RunDriver::noteBestForHook() {
+  if (!hook_ || !reporter_->best()) return;
+  const BestEvaluation& best = *reporter_->best();
+  auto row = results_->table().rowOf(best.number);
+  if (!row) return;
+  row->aggregate = best.aggregate;
+  bestAtEnd_ = hookValues(*row);
+}
+
+void RunDriver::finishHook(std::string_view state) {
+  if (!hook_) return;
+  hook_->finish(state, bestAtEnd_, [this] { return state_.progress.isCancelled(); });
+  hook_.reset();
 }
 
 /// If the run were killed, an earlier report would be taken for its own. That of a run that goes on is removed, as it
@@ -428,11 +448,16 @@ void RunDriver::finish(const TaskOutcome& outcome) {
   results_->close();
   logDifferences();
   results_->writeTables(outcome.tables, state_.log);
+  noteBestForHook();
   const Ending ending{RunStage::finished, outcome.terminationMessage, outcome.terminationMessage};
   if (const auto unwritten = closeResults(ending, outcome.report)) {
     fatalError("Error: Unable to write to " + unwritten->path, unwritten->reason);
   }
   reportRun();
+  // The command may take long, and what becomes of it is told by the log: the workers do not wait for it.
+  const bool hasHook = hook_ != nullptr;
+  if (hasHook) leaveJob(state_, 0);
+  finishHook("finished");
   state_.log.line("");
   for (const std::string& line : reporter_->comparisonLines()) state_.log.line(line);
   const int count = reporter_->evaluationCount();
@@ -440,12 +465,14 @@ void RunDriver::finish(const TaskOutcome& outcome) {
                              : fmt::format("{} model evaluations, {} of them failed", count, reporter_->failedCount()));
   if (reporter_->repeatCount() > 0) {
     state_.log.line(
-        fmt::format("{} of them have the result of an earlier evaluation of the same set, without a model "
+        fmt::format("{} of them {} the result of an earlier evaluation of the same set, without a model "
                     "run (column Repeats of {})",
-                    reporter_->repeatCount(), fileNameOf(results_->table().path())));
+                    reporter_->repeatCount(), reporter_->repeatCount() == 1 ? "has" : "have",
+                    fileNameOf(results_->table().path())));
   }
   if (reporter_->replayedCount() > 0) {
-    state_.log.line(fmt::format("{} of them were taken from the earlier run", reporter_->replayedCount()));
+    state_.log.line(fmt::format("{} of them {} taken from the earlier run", reporter_->replayedCount(),
+                                reporter_->replayedCount() == 1 ? "was" : "were"));
   }
   if (reporter_->lostRunCount() > 0) {
     state_.log.line(fmt::format("{} made once more, as the worker that had it was lost",
@@ -461,7 +488,7 @@ void RunDriver::finish(const TaskOutcome& outcome) {
     fatalError("Error: Unable to write to " + state_.log.path(), state_.log.writeError());
   }
   signalState.runLogDescriptor = -1;
-  leaveJob(state_, 0);
+  if (!hasHook) leaveJob(state_, 0);
   state_.log.close();
   if (!state_.log.writeError().empty()) {
     showMessage(fmt::format("Warning: The end of {} may be missing: {}", state_.log.path(), state_.log.writeError()));
@@ -547,10 +574,11 @@ int RunDriver::endInError(std::string_view message, std::string_view detail) {
     tellOfBestThatDiffers();
   }
   stopWorkersOf(state_);
+  noteBestForHook();
   closeResultsOfEarlyEnd({RunStage::failed, std::string(message), explained}, statistics);
   if (launcher_) launcher_->haltProcesses();  // before the report, which takes time
   reportRun();
-  return endEarly(message);
+  return endEarly(message, "failed");
 }
 
 /// What explains the message stands above it.
@@ -581,6 +609,7 @@ int RunDriver::endCancelled(std::string_view message) {
   const std::vector<std::string> statistics = keepStatistics();
   logDifferences();
   tellOfBestThatDiffers();
+  noteBestForHook();
   closeResultsOfEarlyEnd({RunStage::cancelled, std::string(message), std::string(message)}, statistics);
   {
     const EndingSignalsHeld held;
@@ -590,14 +619,15 @@ int RunDriver::endCancelled(std::string_view message) {
   }
   if (launcher_) launcher_->haltProcesses();
   reportRun();
-  return endEarly(message);
+  return endEarly(message, "cancelled");
 }
 
-int RunDriver::endEarly(std::string_view ending) {
+int RunDriver::endEarly(std::string_view ending, std::string_view state) {
   signalState.runLogDescriptor = -1;
   state_.log.close();
   if (launcher_) launcher_->haltProcesses();
   leaveJob(state_, 1);
+  finishHook(state);
   endProgress(ending);
   tellOfWarnings();
   return 1;

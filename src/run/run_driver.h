@@ -16,6 +16,7 @@
 #include "measures/objective_functions.h"
 #include "parameters/parameter_model.h"
 #include "platform/processes/process_launcher.h"
+#include "run/improvement_hook.h"
 #include "run/results/run_results.h"
 #include "run/results/series_recorder.h"
 #include "run/run_reporter.h"
@@ -79,6 +80,11 @@ class RunDriver final {
   /// Writes the HTML report, if the setup asks for it and there are results. Failures are warnings.
   void reportRun();
   void finish(const TaskOutcome& outcome);
+  void openHook();
+  HookValues hookValues(const ResultRow& row) const;
+  /// Remembers the best evaluation for the end of the improvement command; before the results are closed.
+  void noteBestForHook();
+  void finishHook(std::string_view state);
   void logFailures();
   void logDifferences();
   void tellOfBestThatDiffers() const;
@@ -87,7 +93,7 @@ class RunDriver final {
   void closeLog();
   int endCancelled(std::string_view message);
   /// Closes the log, halts the model processes, leaves the job and ends the progress.
-  int endEarly(std::string_view ending);
+  int endEarly(std::string_view ending, std::string_view state);
   void endProgress(std::string_view ending);
   std::string warningCountText() const;
   std::string whereWarningsAre() const;
@@ -109,6 +115,8 @@ class RunDriver final {
   std::unique_ptr<SeriesRecorder> series_;
   std::unique_ptr<ScenarioSeriesFile> scenarioSeries_;
   std::unique_ptr<RunReporter> reporter_;
+  std::unique_ptr<ImprovementHook> hook_;  ///< if there is an improvement command
+  std::optional<HookValues> bestAtEnd_;    ///< for it
   std::optional<FailedRunPolicy> failedRunPolicy_;
   std::unique_ptr<ProcessLauncher> launcher_;
   std::unique_ptr<ModelRunner> runner_;

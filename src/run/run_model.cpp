@@ -10,6 +10,8 @@
 
 #include "common/run_files.h"
 #include "common/text.h"
+#include "measures/item_names.h"
+#include "run/setup/setup_warnings.h"
 
 namespace mirevo {
 ModelDescription describeModel(const RunConfig& config) {
@@ -17,9 +19,10 @@ ModelDescription describeModel(const RunConfig& config) {
   model.baseFolder = config.baseFolder;
   model.fileTag = config.setupName;
   model.parameterFiles = config.parameterFiles;
-  model.measures = config.measures;
+  model.measures = withItemNumbers(config.measures);
   if (config.readsMeasureFile()) model.measureFile = config.measureFile;
   model.instructions = config.instructions;
+  if (config.readsMeasureFile()) model.furtherMeasureFiles = config.furtherMeasureFiles;
   model.period = config.period;
   model.validationPeriods = config.validationPeriods;
   model.minimumCoverage = config.minimumCoverage;
@@ -50,6 +53,21 @@ LauncherSettings launcherSettings(const RunConfig& config, int slotCount, int fi
   settings.useSingleThread = config.useSingleThread;
   settings.maxSeconds = config.maxSimulationTime;
   return settings;
+}
+
+std::vector<std::string> modelDoubts(const RunConfig& config, const ParameterModel& parameters, ModelRunner& runner) {
+  std::vector<std::string> doubts;
+  const auto add = [&doubts](const std::vector<std::string>& texts) {
+    doubts.insert(doubts.end(), texts.begin(), texts.end());
+  };
+  if (config.task) add(config.task->warnings(parameters.searchSpace()));
+  add(runner.warnings());
+  add(runner.output().warnings());
+  add(unusedParameterWarnings(config.parameters, config.constraints, runner.templates()));
+  for (const ParameterTemplate& parameterTemplate : runner.templates()) {
+    add(parameterTemplate.narrowPlaceholderWarnings(config.parameters));
+  }
+  return doubts;
 }
 
 }  // namespace mirevo

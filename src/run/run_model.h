@@ -1,6 +1,10 @@
 #pragma once
 
+#include <string>
+#include <vector>
+
 #include "evaluation/model_run.h"
+#include "parameters/parameter_model.h"
 #include "platform/processes/process_launcher.h"
 #include "run/setup/run_config.h"
 
@@ -11,5 +15,8 @@ ModelDescription describeModel(const RunConfig& config);
 
 /// The launcher's settings for `slotCount` slots, whose process folders are numbered from `firstFolderNumber` on.
 LauncherSettings launcherSettings(const RunConfig& config, int slotCount, int firstFolderNumber = 1);
+
+/// What the user should know, before the model is run, of settings and files that work but may not be meant.
+std::vector<std::string> modelDoubts(const RunConfig& config, const ParameterModel& parameters, ModelRunner& runner);
 
 }  // namespace mirevo

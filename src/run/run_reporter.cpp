@@ -160,6 +160,7 @@ void RunReporter::evaluationFinished(std::span<const double> set, const Evaluati
     compareFinalRun(result);
   }
   recordSeries(values, result);
+  if (improved_ && best() && best()->number == result.number) improved_(result);
   state_.progress.progressStep();
   if (const std::string problem = state_.progress.takeProblem(); !problem.empty()) state_.log.warning(problem);
   requireLogWritten();

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <functional>
 #include <map>
 #include <optional>
 #include <set>
@@ -62,7 +63,17 @@ class RunReporter final : public EvaluationObserver {
   void evaluationFinished(std::span<const double> set, const EvaluationResult& result) override;
   void evaluationReplayed(std::span<const double> set, const EvaluationResult& result) override;
   void runCompared(const ComparisonFindings& found) override;
-  bool isCancelled() override { return state_.progress.isCancelled(); }
+  bool isCancelled() override {
+    if (lookAround_) lookAround_();
+    return state_.progress.isCancelled();
+  }
+
+  /// From now on `improved` is called when an evaluation that was made by this run is the best so far, and `lookAround`
+  /// several times a second while models run.
+  void followBest(std::function<void(const EvaluationResult&)> improved, std::function<void()> lookAround) {
+    improved_ = std::move(improved);
+    lookAround_ = std::move(lookAround);
+  }
 
   /// At the end of a run: fills in the aggregates of evaluations made before the transformation of the objective
   /// functions was known, if it is known now.
@@ -143,6 +154,8 @@ class RunReporter final : public EvaluationObserver {
   BestChoice best_;
   InitialChoice initial_;
   std::vector<Unsettled> unsettled_;
+  std::function<void(const EvaluationResult&)> improved_;
+  std::function<void()> lookAround_;
   bool keepsJudged_ = false;
   std::map<int, JudgedEvaluation> judged_;
   int evaluationCount_ = 0;

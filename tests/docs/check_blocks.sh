@@ -7,6 +7,9 @@
 #             know its sections and keywords. "[...]" on a line of its own leaves something out.
 #   sh        commands that need another machine, or a model of the reader's: bash must be able to parse them
 #   text      not to be run: output of long runs, formulas, file listings, data
+#   python, r  the blocks of a page are run together, in order, by the readers that READERS names ("python r"), followed
+#             by tests/docs/<page>.py or .R, which holds what they must have read. tests/docs/<page>.sh, if there is one,
+#             is run before the page. Ends with 77 if all else is well and a reader, or its package, is not installed.
 #   any, with file=NAME: the block is written to that file
 # Each page runs in a folder of its own. Pages other than the tutorial find what the tutorial leaves there, and
 # basin.kdx, a short calibration that has been run.
@@ -25,6 +28,8 @@ work=$(realpath "$work")
 reference=$source/docs/setup-reference.md
 bad=0
 blocks=0
+readers=${READERS-}
+lacking=''
 complain() {
   printf '%s:%s: %s\n' "$page" "$start" "$*"
   bad=1
@@ -119,15 +124,46 @@ check_block() {
     kdx) check_setup "$text" "$inside" ;;
     sh) bash -n <<<"$text" || complain "no commands that bash can parse" ;;
     text) ;;
-    *) complain "a block of the kind \"$kind\": console, kdx, sh, text, or a file" ;;
+    python | r) printf '%s\n' "$text" >>"$work/$name.$kind" ;;
+    *) complain "a block of the kind \"$kind\": console, kdx, sh, python, r, text, or a file" ;;
   esac
+}
+
+# The python that has pandas: another one may come first.
+find_python() {
+  local each
+  for each in python3 /usr/bin/python3; do
+    if "$each" -c 'import pandas' 2>/dev/null; then echo "$each" && return; fi
+  done
+}
+
+run_reader() {
+  local kind=$1 stem=$2 program=''
+  [ -s "$work/$name.$kind" ] || return
+  case $kind in
+    python) program=$(find_python) ;;
+    r) if command -v Rscript >/dev/null && Rscript -e 'stopifnot(requireNamespace("jsonlite"))' >/dev/null 2>&1; then program=Rscript; fi ;;
+  esac
+  if [ -z "$program" ]; then
+    case $kind in
+      python) lacking+=' python3 with pandas' ;;
+      r) lacking+=' R with jsonlite' ;;
+    esac
+    return
+  fi
+  case $kind in
+    python) cat "$source/tests/docs/$stem.py" ;;
+    r) cat "$source/tests/docs/$stem.R" ;;
+  esac >>"$work/$name.$kind"
+  start=$kind
+  "$program" "$work/$name.$kind" >"$work/output" 2>&1 || complain "$(<"$work/output")"
 }
 
 for page in "$@"; do
   name=$(tr / - <<<"${page%.md}")
   if [ "$page" = docs/tutorial.md ]; then
     mkdir "$work/$name"
-  elif grep -q '^ *```console' "$source/$page"; then
+  elif grep -Eq '^ *```(console|python|r)' "$source/$page"; then
     # What the tutorial leaves, and a short calibration under the name that other pages use.
     if [ ! -d "$work/basin" ]; then
       cp -R "$work/docs-tutorial" "$work/basin" || exit 1
@@ -139,6 +175,9 @@ for page in "$@"; do
     mkdir "$work/$name"
   fi
   cd "$work/$name" || exit 1
+  stem=$(basename "$page" .md)
+  # shellcheck disable=SC1090
+  if [ -n "$readers" ] && [ -f "$source/tests/docs/$stem.sh" ]; then . "$source/tests/docs/$stem.sh"; fi
   fence=''
   number=0
   previous=''
@@ -168,7 +207,12 @@ for page in "$@"; do
     previous=$line
   done 3<"$source/$page"
   [ -z "$fence" ] || complain "a code block without its end"
+  for kind in $readers; do run_reader "$kind" "$stem"; done
 done
 [ "$blocks" -gt 0 ] || { echo "no block was found"; exit 1; }
 echo "$blocks blocks"
+if [ $bad = 0 ] && [ -n "$lacking" ]; then
+  echo "skipped, as not installed:$lacking"
+  exit 77
+fi
 exit $bad

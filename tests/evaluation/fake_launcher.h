@@ -33,10 +33,10 @@ class FakeLauncher final : public ProcessLauncher {
     prefix_ = settings.processFolderPrefix;
     baseFolder_ = settings.baseFolder;
     slots_.resize(static_cast<std::size_t>(settings.slotCount));
-    for (int slot = 1; slot <= settings.slotCount; ++slot) renewFolder(slot);
+    for (int slot = 1; slot <= settings.slotCount; ++slot) renewFolder(slot, {});
     return initialiseError.empty();
   }
-  bool renewFolder(int slot) override {
+  bool renewFolder(int slot, const std::function<void()>& /*look*/) override {
     if (!renewError.empty()) return false;
     std::filesystem::remove_all(getProcessFolder(slot));
     std::filesystem::copy(baseFolder_, getProcessFolder(slot), std::filesystem::copy_options::recursive);

@@ -20,7 +20,7 @@ class ModelRunTest : public EvaluationTest {
 
   EvaluationResult evaluate(double a) {
     const std::vector<double> set = {a};
-    EXPECT_FALSE(runner_->prepareModelRun(set, 1).has_value());
+    EXPECT_FALSE(runner_->prepareModelRun(set, 1, ++number_).has_value());
     launcher_.now += batch_.seconds;
     std::int32_t executing = 1;
     std::int32_t status = 0;
@@ -36,6 +36,7 @@ class ModelRunTest : public EvaluationTest {
     return refusalOf([this] { makeRunner(launcher_, 1); });
   }
 
+  int number_ = 0;
   FakeLauncher::Batch batch_;
   FakeLauncher launcher_;
 };
@@ -119,6 +120,61 @@ TEST_F(ModelRunTest, NumbersOfAListingAreFoundByInstructions) {
   EXPECT_EQ(evaluate(2.0).failure->reason,
             folder_ / "run_Process1/out/listing.txt" +
                 ":2:5: expected a number, found \"7.5m\" (the number \"rms\" at i.ins:2:7)");
+}
+
+/// A listing that is in the base folder is one of a run before; without it the first one that is read tells.
+TEST_F(ModelRunTest, InstructionsThatAListingDoesNotFitOrThatCutItsNumbersAreWarnedOf) {
+  description_.measures[0].interfaceType = InterfaceType::measureFile;
+  description_.measureFile = folder_ / "base/out/listing.txt";
+  folder_.write("base/out/keep", "");
+  std::string reason;
+  description_.instructions =
+      std::make_shared<const InstructionFile>(InstructionFile::parse("i.ins", "pif ~\nl1 [rms]5:7\n", reason).value());
+  const auto warnings = [this](const char* before) {
+    before == nullptr ? void(std::filesystem::remove(description_.measureFile))
+                      : void(folder_.write("base/out/listing.txt", before));
+    makeRunner(launcher_, 1);
+    return runner_->output().warnings();
+  };
+  EXPECT_THAT(
+      warnings("RMS x\n"),
+      ElementsAre(AllOf(StartsWith(description_.measureFile + ":1:5: expected a number, found \"x\" (the number "
+                                                              "\"rms\" at i.ins:2:4)\nThis listing, as it is in"),
+                        HasSubstr("A model run that writes such a one has failed"))));
+  EXPECT_THAT(warnings("RMS 7.5\n"), ElementsAre());
+  writes("out/listing.txt", "RMS 17.51\n");
+  EXPECT_THAT(evaluate(2.0).warnings, ElementsAre(HasSubstr("the columns 5:7 cut \"17.51\"")));
+  EXPECT_THAT(warnings("RMS 17.51\n"), ElementsAre(HasSubstr(":1:5: the columns 5:7 cut \"17.51\", of which \"17.\"")));
+  EXPECT_THAT(warnings(nullptr), ElementsAre());
+  writes("out/listing.txt", "RMS 17.51\n");
+  EXPECT_THAT(evaluate(2.0).warnings, ElementsAre(HasSubstr("the columns 5:7 cut \"17.51\"")));
+  EXPECT_THAT(evaluate(2.0).warnings, ElementsAre());
+}
+
+TEST_F(ModelRunTest, SeveralListingsGiveOneListOfNumbersAndDifferencesToObservedValues) {
+  std::string reason;
+  const auto read = [&reason](const char* text) {
+    return std::make_shared<const InstructionFile>(InstructionFile::parse("i.ins", text, reason).value());
+  };
+  description_.measures[0].interfaceType = InterfaceType::measureFile;
+  description_.measures[0].measurementNo = 3;
+  description_.measures[0].observedValue = 4.0;
+  description_.measures[0].weight = 10.0;
+  description_.measures[0].weightAbove = 100.0;
+  description_.measureFile = folder_ / "base/out/a.txt";
+  description_.instructions = read("pif ~\nl1 !a! !b!\n");
+  description_.furtherMeasureFiles = {{folder_ / "base/out/b.txt", "", read("pif ~\nl1 !c!\n")}};
+  folder_.write("base/out/keep", "");
+  makeRunner(launcher_, 1);
+  for (const auto& [number, measure] : {std::pair("3", -10.0), {"4.5", 50.0}, {"4", 0.0}}) {
+    batch_.write = [this, number = number](const std::string& folder) {
+      std::ofstream(folder + "/out/a.txt") << "1 2\n";
+      std::ofstream(folder + "/out/b.txt") << number << "\n";
+    };
+    EXPECT_THAT(evaluate(2.0).measureValues, ElementsAre(measure)) << number;
+  }
+  batch_.write = [](const std::string& folder) { std::ofstream(folder + "/out/a.txt") << "1 2\n"; };
+  EXPECT_THAT(evaluate(2.0).failure.value().reason, HasSubstr("did not write"));
 }
 
 TEST_F(ModelRunTest, MeasureFileValuesAreTakenByTheirNumber) {
@@ -299,7 +355,7 @@ TEST_F(ModelRunTest, CrossSectionFilesHaveTheirResistanceNumbersUpdated) {
   };
   for (const auto& [outcome, text] : texts) {
     launcher_.resistanceUpdate = outcome;
-    EXPECT_EQ(refusalMessageOf([this] { runner_->prepareModelRun(std::vector<double>{2.0}, 1); }),
+    EXPECT_EQ(refusalMessageOf([this] { runner_->prepareModelRun(std::vector<double>{2.0}, 1, 1); }),
               std::string("Error updating resistance numbers: ") + text);
   }
 }

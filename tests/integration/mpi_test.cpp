@@ -32,6 +32,13 @@ class Mpi : public ::testing::Test {
   ModelFolder folder_;
 };
 
+TEST_F(Mpi, OneProcessChecksTheSetup) {
+  const ProgramResult result = runJob(3, {"--check", folder_.writeSetup({})});
+  EXPECT_EQ(result.exitCode, 0) << result.error;
+  EXPECT_EQ(occurrences(result.output, "Check of "), 1);
+  EXPECT_EQ(occurrences(result.output, "Nothing is wrong"), 1);
+}
+
 TEST_F(Mpi, AJobWritesTheResultsOfAPlainRun) {
   const std::pair<RunSettings, int> cases[] = {
       {{.maxEvaluations = 25}, 2},
@@ -70,6 +77,19 @@ TEST_F(Mpi, AJobWritesTheResultsOfAPlainRun) {
     }
     EXPECT_THAT(folder_.read("basin._spi_"), EndsWith("PROGRE100.0\n"));
   }
+}
+
+TEST_F(Mpi, WorkersThatTheSearchHasNoUseForAreNamed) {
+  folder_.writeSetup({.algorithm = 2, .maxEvaluations = 12});
+  folder_.editSetup("Algorithm_Type = 2", "Algorithm_Type = 'PDDS'");
+  folder_.editSetup("Candidates = 6", "Candidates = 2");
+  const auto warningsWith = [this](int processes) {
+    const ProgramResult job = runJob(processes, {folder_ / "basin.kdx"});
+    EXPECT_EQ(job.exitCode, 0) << job.error << log();
+    return occurrences(log(), "Only 2 workers can be used by the evaluations of this run");
+  };
+  EXPECT_EQ(warningsWith(3), 0);
+  EXPECT_EQ(warningsWith(4), 1);
 }
 
 // exp(ln(5)) is 4.999999999999999, and exp(ln(10)) is above 10.

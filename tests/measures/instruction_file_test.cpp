@@ -69,11 +69,48 @@ TEST(InstructionFile, SaysWhereAListingIsNotAsItSays) {
       {"l5 w w w w !a!", "expected blanks and something behind them"},
       {"l5 t8 !a!", "out.lst:5:9: t8 is within the number \"3.50E+01\": expected a column before its first digit"},
       {"l5 t80 !a!", "expected a line of 80 columns or more, found 26"},
+      // Markers that cut a number
+      {"~Inflow:1~ !q!",
+       "out.lst:3:29: the marker in front of the number ends within \"Inflow:12.25m3/s\": expected one that leaves it "
+       "whole (the number \"q\" at i.ins:2:12)"},
+      {"l5 w w !h! ~E+~", "out.lst:5:7: the marker behind the number begins within \"3.50E+01\""},
+      {"l5 ~3.50E~ !h!", "the marker in front of the number ends within \"3.50E+01\""},
+      {"l5 ~3.50E+~ !h!", "the marker in front of the number ends within \"3.50E+01\""},
+      {"l7 !dum! !d! ~2~", "out.lst:7:30: expected a number, found \"2.2\""},  // nothing is left of it
   };
   for (const auto& [lines, expected] : cases) {
     const auto [values, reason] = readWith(std::string("pif ~\n") + lines, kListing);
     EXPECT_TRUE(values.empty()) << lines;
     EXPECT_THAT(reason, HasSubstr(expected)) << lines;
+  }
+}
+
+TEST(InstructionFile, TellsOfColumnsThatCutANumber) {
+  // The columns, and what is said of them; nothing where others go on with the number, or no number goes on.
+  const std::pair<const char*, const char*> cases[] = {
+      {"l7 [a]1:8 [b]9:16 [c]17:24", ""},
+      {"l7 [a]1:8",
+       "out.lst:7:1: the columns 1:8 cut \"1236.5678495.123-900.999\", of which \"1236.567\" is read "
+       "(i.ins:2:4)"},
+      {"l7 [b]9:16", "out.lst:7:9: the columns 9:16 cut"},
+      {"l7 [c]17:24", ""},  // from its sign on
+      {"l7 [c]18:24", "out.lst:7:18: the columns 18:24 cut"},
+      {"l7 [d]28:33", ""},
+      {"l5 [a]7:10", "of which \"3.50\" is read"},  // without its exponent
+      {"l5 [a]7:14", ""},
+      {"l5 [a]19:26", "out.lst:5:19: the columns 19:26 cut \"-1.25D-02\", of which \"1.25D-02\" is read"},
+      {"l3 [t]8:11\nl2 [h]8:10", "is read (i.ins:2:4); so do 1 more"},
+      {"l7 [dum]1:18 !c!", "of which \"1236.5678495.123-9\" is read"},
+      {"l7 [dum]1:18 [d]29:33", ""},
+  };
+  for (const auto& [lines, expected] : cases) {
+    std::string reason;
+    std::vector<std::string> doubts;
+    const auto file = InstructionFile::parse("i.ins", std::string("pif ~\n") + lines, reason);
+    ASSERT_TRUE(file) << reason;
+    EXPECT_TRUE(file->read("out.lst", kListing, reason, nullptr, &doubts)) << lines << ": " << reason;
+    doubts.resize(1);
+    EXPECT_THAT(doubts.front(), *expected == 0 ? ::testing::Matcher<std::string>("") : HasSubstr(expected)) << lines;
   }
 }
 

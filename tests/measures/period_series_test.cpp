@@ -42,5 +42,29 @@ TEST(PeriodSeries, ValuesBetweenStepsAreLinearAndNeverBesideAMissingOne) {
   EXPECT_THAT(valuesAt(series, seconds, 9.9 / 86400.0), ElementsAre(nan, 1.0F, nan, 2.0F, nan, nan, nan, 4.0F, nan));
 }
 
+TEST(PeriodSeries, OfMoreThanAHundredPairsThoseOfTheSameItemsAreShownOnce) {
+  // Selections of the observations of each item, and a second way of matching of the first one.
+  const auto measuresOf = [](int items, int selections) {
+    std::vector<OutputMeasure> measures;
+    for (int i = 0; i < items * selections; ++i) {
+      OutputMeasure& measure = measures.emplace_back();
+      measure.simulation = {"s.csv", i % items + 1};
+      measure.observation = {"o.csv", i % items + 1};
+      measure.selection.lowestObserved = 0.1 * (i / items);
+    }
+    measures.push_back(measures.front());
+    measures.push_back(measures.front());
+    measures.back().timeMatch.offsetHours = 12.0;
+    return measures;
+  };
+  const auto few = measuresOf(9, 11);  // 99 pairs, and the one that is matched otherwise
+  EXPECT_EQ(measuresOfDistinctPairs(few).size(), 100U);
+  EXPECT_EQ(pairsShownWithOthers(few), 0U);
+  const auto many = measuresOf(10, 10);
+  EXPECT_THAT(measuresOfDistinctPairs(many), ElementsAre(0, 1, 2, 3, 4, 5, 6, 7, 8, 9, 101));
+  EXPECT_EQ(pairsShownWithOthers(many), 90U);
+  EXPECT_EQ(measuresOfDistinctPairs(measuresOf(150, 1)).size(), 151U) << "all are of different items";
+}
+
 }  // namespace
 }  // namespace mirevo

@@ -9,6 +9,7 @@
 
 #include "common/reading_watch.h"
 #include "matchers.h"
+#include "measures/listing_series.h"
 #include "measures/statistics.h"
 #include "refusal.h"
 #include "temporary_folder.h"
@@ -45,6 +46,38 @@ TEST_F(SeriesTablesTest, MeasuresShareTheFilesTheyNameAlike) {
   EXPECT_EQ(tables.tryOpenSimulationFiles(tables.simulationFileNames()), std::nullopt);
   EXPECT_EQ(&tables.simulation(0), &tables.simulation(3));
   EXPECT_EQ(tables.simulation(2).itemCount(), 2);
+}
+
+TEST_F(SeriesTablesTest, AListingIsReadAsItsMeasuresSay) {
+  folder_.write("sim.lst", "5.5 6\n");
+  ListingFault fault;
+  const auto formOf = [&](const std::string& instructions) {
+    const ListingSettings settings{.instructionFile = "i.ins", .start = DateRecord{2001, 1, 1}, .stepHours = 24.0};
+    return ListingForm::make(settings, "pif ~\n" + instructions, "", fault);
+  };
+  std::vector<OutputMeasure> measures(3, measure("sim.lst", "obs.csv"));
+  measures[0].simulation.listing = measures[2].simulation.listing = formOf("l1 [q_1]1:3 !h_1!\n");
+  measures[2].simulation.itemNo = 2;
+  measures[1].simulation.listing = formOf("l1 !dum! !q_1!\n");
+  SeriesTables tables = SeriesTables::MirevoTSobjectInit(measures, kPeriod);
+  EXPECT_THAT(tables.simulationFileNames(), ElementsAre(folder_ / "sim.lst", folder_ / "sim.lst"));
+  EXPECT_EQ(tables.comparedItems(2).simulated, "item No. 2 (h)");
+  EXPECT_EQ(tables.tryOpenSimulationFiles(tables.simulationFileNames()), std::nullopt);
+  EXPECT_EQ(&tables.simulation(0), &tables.simulation(2));
+  EXPECT_THAT(tables.simulation(0).values(1), ElementsAre(5.5F));
+  EXPECT_THAT(tables.simulation(1).values(1), ElementsAre(6.0F));
+  EXPECT_THAT(tables.takeDoubts(), ElementsAre());
+  // A run may write a longer number.
+  folder_.write("sim.lst", "15.5 6\n");
+  for (const std::size_t count : {1U, 0U}) {
+    EXPECT_EQ(tables.tryOpenSimulationFiles(tables.simulationFileNames()), std::nullopt);
+    EXPECT_EQ(tables.takeDoubts().size(), count);
+  }
+  folder_.write("sim.lst", "15.5 x\n");
+  EXPECT_THAT(tables.tryOpenSimulationFiles(tables.simulationFileNames()).value_or(""),
+              HasSubstr("sim.lst:1:6: expected a number, found \"x\" (the number \"q_1\" at i.ins:2:10)"));
+  EXPECT_THAT(refusalOf([&] { SeriesTables::MirevoTSobjectInit(measures, kPeriod); }),
+              StartsWith("Error opening TS object for file: "));
 }
 
 TEST_F(SeriesTablesTest, ObservationsThatMayBeMarkersOfMissingOnesAreWarnedOf) {

@@ -111,6 +111,21 @@ TEST(ParameterTemplate, FillsPlaceholders) {
   EXPECT_THAT(ParameterTemplate("t", "!\n!no id! !K!\n!K !", parameters()).parametersNamed(), ElementsAre(0, 4));
 }
 
+TEST(ParameterTemplate, TakesATemplateOfPestAsItIs) {
+  const std::string text = "ptf  #  \nk #k    # #  K2   #\n#\tMANNING Channel #\n";
+  const ParameterTemplate form("in.tpl", text, parameters());
+  EXPECT_EQ(form.fill(std::vector<double>{2.0 / 3.0, 0.03, 1, 12, 1, 1, 1}),
+            "k .666667      12.0\n               0.03\n");
+  EXPECT_THAT(templateDoubts(form, TemplateType::delimiter, text, parameters()), ::testing::IsEmpty());
+  EXPECT_EQ(form.unwritableValue(std::vector<double>{1e300, 1, 1, 1, 1, 1, 1}, parameters()), "");
+  EXPECT_THAT(form.unwritableValue(std::vector<double>(7, std::nan("")), parameters()),
+              HasSubstr("the value NaN of parameter \"K\" cannot be written in its field, in.tpl:2"));
+  EXPECT_THAT(refusalOf([] { ParameterTemplate("in.tpl", "ptf ~\n~q~\n", parameters()); }),
+              HasSubstr("in.tpl:2:1: no parameter has the name \"q\""));
+  EXPECT_THAT(refusalOf([] { ParameterTemplate("in.tpl", "ptf 5\n5K5\n", parameters()); }),
+              HasSubstr("is a character of numbers"));
+}
+
 TEST(ParameterTemplate, RefusesWhatItCannotFill) {
   const std::tuple<std::string, const char*, const char*> cases[] = {
       {"", "Error: Delimiter not defined in template file t", "first line"},

@@ -5,6 +5,7 @@
 #include <random>
 #include <sstream>
 #include <string>
+#include <tuple>
 
 #include <fmt/format.h>
 #include <gtest/gtest.h>
@@ -57,6 +58,50 @@ TEST(FormatValueForPlaceholder, WritesByHandComputedTexts) {
     }
   }
   EXPECT_EQ(count, 49);
+}
+
+TEST(FormatValueForPlaceholder, RoundsToWhatTheWholeFieldHolds) {
+  const std::tuple<double, int, const char*> cases[] = {
+      {0.0, 5, "  0.0"},
+      {0.0, 2, "0."},
+      {12.0, 8, "    12.0"},
+      {12.0, 3, "12."},
+      {-12.0, 3, "*  "},
+      {2.0 / 3.0, 5, ".6667"},
+      {2.0 / 3.0, 4, ".667"},
+      {-2.0 / 3.0, 2, "* "},
+      {1.0 / 3.0, 24, "      0.3333333333333333"},
+      {0.1, 24, "                     0.1"},
+      {1234.5678, 6, "1234.6"},
+      {1999.96, 6, "2000.0"},
+      {1999.96, 5, "2000."},
+      {2.5e-10, 6, "3.E-10"},
+      {123456789.0, 7, "1.235E8"},
+      {1.23456e-120, 12, "1.23456E-120"},
+      {1.23456e-120, 9, "1.23E-120"},
+      {-1.7976931348623157e308, 24, "-1.7976931348623157E+308"},
+      {std::nan(""), 4, "*   "},
+      {HUGE_VAL, 4, "*   "},
+  };
+  for (const auto& [value, width, expected] : cases) {
+    const std::string written = FormatValueForPlaceholder(value, {width, ValueForm::rounded});
+    EXPECT_EQ(written, expected) << value;
+  }
+}
+
+TEST(FormatValueForPlaceholder, LosesNoMoreThanHalfOfTheLastDigit) {
+  std::mt19937_64 random(7);
+  std::uniform_real_distribution<double> exponents(-12.0, 12.0);
+  for (int i = 0; i < 2000; ++i) {
+    const double value = (i % 2 == 0 ? 1.0 : -1.0) * std::pow(10.0, exponents(random));
+    EXPECT_EQ(valueAsWritten(value, {26, ValueForm::rounded}), value);
+    for (const int width : {10, 14}) {
+      const auto read = valueAsWritten(value, {width, ValueForm::rounded});
+      ASSERT_TRUE(read) << value;
+      // At worst sign, digit, point and exponent part (1.2E-12) take the room that digits could have.
+      EXPECT_LE(std::abs(*read - value), 0.5 * std::pow(10.0, 7 - width) * std::abs(value) * 1.001) << value;
+    }
+  }
 }
 
 TEST(FormatValueForPlaceholder, ReadsBackWithinTheWidth) {

@@ -21,7 +21,10 @@ TEST(SeriesAbove, IsRequiredAtTheStartOfARunAndMissedWithANoteInAReport) {
   folder.write("rain.csv", "time,T,P\n2000-12-31,7,9\n2001-01-01,7,0\n2001-01-01 12:00,7,4\n2001-01-02,7,1\n");
   OutputMeasure plain{.name = "Q", .simulation = {folder / "flow.csv"}, .observation = {folder / "flow.csv"}};
   OutputMeasure with = plain;
-  with.shownAbove = {folder / "rain.csv", 2, "setup.kdx:9:1: File_Name: ", "setup.kdx:10:1: Item_No: "};
+  with.shownAbove = {.fileName = folder / "rain.csv",
+                     .itemNo = 2,
+                     .fileLocation = "setup.kdx:9:1: File_Name: ",
+                     .itemLocation = "setup.kdx:10:1: Item_No: "};
   std::vector<OutputMeasure> measures{plain, with};
   const std::vector<std::int64_t> seconds{secondNumber({2001, 1, 1}), secondNumber({2001, 1, 2})};
   const auto start = [&] { SeriesTables::MirevoTSobjectInit(measures, {{2001, 1, 1}, {2001, 1, 2}}); };

@@ -65,6 +65,46 @@ TEST(CommandLine, TheLastQuestionCountsUnlessTheLastArgumentIsAFile) {
   }
 }
 
+TEST(CommandLine, CommandsAreGivenAnywhereUnlessTheLastArgumentIsAFileOfThatName) {
+  using Arguments = std::vector<std::string>;
+  struct Case {
+    Arguments arguments;
+    std::string_view name;
+    std::string_view argument;
+    const char* ignored;
+    const char* mistyped;
+  };
+  const Case cases[] = {
+      {{"--check", "a.kdx"}, "--check", "a.kdx", "", ""},
+      {{"a.kdx ", "--check"}, "--check", "a.kdx", "", ""},
+      {{"--check"}, "--check", "", "", ""},
+      {{"--check", " "}, "--check", "", "", ""},
+      {{"--new"}, "", "", "", ""},  // a file
+      {{"a.kdx", "--new"}, "", "", "", ""},
+      {{"--new", "basin", "//qmon"}, "--new", "basin", "Ignored: \"//qmon\"; no run is made", ""},
+      {{"--check", "a.kdx", "b.kdx"}, "--check", "b.kdx", "Ignored: \"a.kdx\"; no run is made", ""},
+      {{"--chek", "a.kdx"}, "", "", "", "--check"},
+      {{"--CHECK", "a.kdx"}, "", "", "", "--check"},
+      {{"--mew", "a.kdx"}, "", "", "", "--new"},
+      {{"--mew"}, "", "", "", ""},
+      {{"-n", "--nodes", "a.kdx"}, "", "", "", ""},
+  };
+  for (const Case& each : cases) {
+    const CommandLine commandLine(each.arguments);
+    SCOPED_TRACE(each.arguments.front() + " " + each.arguments.back());
+    const auto command = commandLine.command([](const std::string& file) { return file == "--new"; });
+    ASSERT_EQ(command.has_value(), !each.name.empty());
+    if (command) {
+      EXPECT_EQ(command->name, each.name);
+      EXPECT_EQ(command->argument, each.argument);
+      EXPECT_EQ(command->ignored, each.ignored[0] == '\0' ? Arguments{} : Arguments{each.ignored});
+      continue;
+    }
+    const auto mistyped = commandLine.mistypedCommand();
+    EXPECT_EQ(mistyped ? mistyped->second : "", each.mistyped);
+  }
+}
+
 TEST(CommandLine, WhatHasNoEffectIsNamed) {
   const std::pair<std::vector<std::string>, const char*> cases[] = {
       {{"a.kdx", "//QMON"}, ""},

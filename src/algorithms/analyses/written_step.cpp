@@ -28,7 +28,7 @@ using OfSides = std::array<double, 3>;
 /// A field whose values change with the variable parameter.
 struct ChangingField {
   std::string name;  ///< that of a dependent parameter; empty: the field of the variable parameter itself
-  int width = 0;
+  ValueField field = 0;
   OfSides modelValues{};
   OfSides wanted{};   ///< search scale for the variable parameter itself, model scale for a dependent one
   OfSides written{};  ///< the same as the model reads it; NaN where the field holds no number
@@ -45,20 +45,20 @@ struct ChangingField {
 
   std::string text() const {
     const auto writtenText = [&](Side side) {
-      return std::string(trim(FormatValueForPlaceholder(modelValues[side], width)));
+      return std::string(trim(FormatValueForPlaceholder(modelValues[side], field)));
     };
     const std::string where =
-        name.empty() ? fmt::format("its field of {} characters", width)
-                     : fmt::format("the field of {} characters of the dependent parameter {}", width, name);
+        name.empty() ? fmt::format("its field of {} characters", field.width)
+                     : fmt::format("the field of {} characters of the dependent parameter {}", field.width, name);
     return fmt::format("in {} {} is written as \"{}\" and {} as \"{}\"", where, formatReal(modelValues[below]),
                        writtenText(below), formatReal(modelValues[above]), writtenText(above));
   }
 };
 
 /// The search-scale value of what the model reads for a value of parameter j; NaN if the field holds no number.
-double searchValueAsWritten(const SearchSpace& space, std::size_t j, double value, int fieldWidth) {
+double searchValueAsWritten(const SearchSpace& space, std::size_t j, double value, ValueField field) {
   const double modelValue = toModelScale(space, j, value);
-  const std::optional<double> written = valueAsWritten(modelValue, fieldWidth);
+  const std::optional<double> written = valueAsWritten(modelValue, field);
   if (!written || *written == modelValue) return written ? value : kNaN;
   if (space.transformation[j] != TransformationType::logarithmic) return *written;
   return *written > 0.0 ? std::log(*written) : kNaN;
@@ -76,13 +76,13 @@ bool isUnchanged(const OfSides& values) {
 std::vector<ChangingField> changingFields(const ParameterFields& fields, const SearchSpace& space, std::size_t j,
                                           const std::array<const ParameterSet*, 3>& sets) {
   std::vector<ChangingField> changing;
-  if (const int width = fields.widthOf(j); width > 0) {
+  if (const ValueField placeholder = fields.fieldOf(j); placeholder.width > 0) {
     ChangingField field;
-    field.width = width;
+    field.field = placeholder;
     for (const Side side : {below, base, above}) {
       field.wanted[side] = (*sets[side])[j];
       field.modelValues[side] = toModelScale(space, j, field.wanted[side]);
-      field.written[side] = searchValueAsWritten(space, j, field.wanted[side], width);
+      field.written[side] = searchValueAsWritten(space, j, field.wanted[side], placeholder);
     }
     changing.push_back(std::move(field));
   }
@@ -93,10 +93,10 @@ std::vector<ChangingField> changingFields(const ParameterFields& fields, const S
     if (values[side].size() != fields.dependents.size()) return changing;  // a set that fails
   }
   for (std::size_t i = 0; i < fields.dependents.size(); ++i) {
-    ChangingField field{fields.dependents[i].name, fields.dependents[i].width};
+    ChangingField field{fields.dependents[i].name, fields.dependents[i].field};
     for (const Side side : {below, base, above}) {
       field.modelValues[side] = field.wanted[side] = values[side][i];
-      field.written[side] = valueAsWritten(values[side][i], field.width).value_or(kNaN);
+      field.written[side] = valueAsWritten(values[side][i], field.field).value_or(kNaN);
     }
     if (!isUnchanged(field.wanted)) changing.push_back(std::move(field));
   }

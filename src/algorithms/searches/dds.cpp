@@ -73,7 +73,8 @@ SearchStatus Dds::initialise() {
   replacedSteps_.assign(bounds_.size(), 0);
   largestSteps_.assign(bounds_.size(), 0.0);
   std::vector<ParameterSet> points = startPoints();
-  feasible_.replaceInSample(points, startFromInitial_ ? 1 : 0, bounds_, random_);
+  const bool areGiven = startFromInitial_ || !givenStarts_.empty();
+  feasible_.replaceInSample(points, areGiven ? points.size() : 0, bounds_, random_);
   std::vector<EvaluationResult> results = evaluator_.evaluateParameterSets(points, DispatchMode::task);
   evaluator_.settleAggregates(results);
   summary_.evaluationCount = static_cast<int>(points.size());
@@ -142,7 +143,13 @@ void Dds::mergeImprovements(const Candidate& candidate, double value) {
 }
 
 std::vector<ParameterSet> Dds::startPoints() {
-  if (startFromInitial_) return {bounds_.initial};
+  if (startFromInitial_ || !givenStarts_.empty()) {
+    std::vector<ParameterSet> given;
+    if (startFromInitial_) given.push_back(bounds_.initial);
+    given.insert(given.end(), givenStarts_.begin(), givenStarts_.end());
+    given.resize(std::min(given.size(), static_cast<std::size_t>(maxEvaluations_)));
+    return given;
+  }
   std::vector<ParameterSet> points(static_cast<std::size_t>(ddsStartPointCount(maxEvaluations_)));
   for (ParameterSet& point : points) {
     point.resize(bounds_.size());
@@ -267,8 +274,14 @@ std::string_view DdsMethod::budgetRefusal() const {
   return "Error: Maximum No. of model evaluations in DDS algorithm invalid";
 }
 
+bool DdsMethod::evaluatesSample(const InitialSampleSettings& sample) const {
+  if (sample.earlierSetCount == 0) return !sample.includeInitialParameters;
+  return sample.earlierSetCount + (sample.includeInitialParameters ? 1 : 0) > 1;
+}
+
 std::int64_t DdsMethod::sampleSize(const InitialSampleSettings& sample, int budget) const {
-  return evaluatesSample(sample) ? ddsStartPointCount(budget) : 1;
+  const std::size_t given = sample.earlierSetCount + (sample.includeInitialParameters ? 1 : 0);
+  return given == 0 ? ddsStartPointCount(budget) : std::min<std::int64_t>(static_cast<std::int64_t>(given), budget);
 }
 
 RaisedBudget DdsMethod::raiseBudget(const SearchHistory& history, const StoppingCriteria& stopping,
@@ -292,9 +305,11 @@ RaisedBudget DdsMethod::raiseBudget(const SearchHistory& history, const Stopping
 std::unique_ptr<Dds> DdsMethod::makeDds(SearchProblem problem) const {
   const bool continues = !problem.earlierSearches.empty();
   const int made = continues ? problem.earlierSearches.back().lastEvaluation : 0;
-  return std::make_unique<Dds>(settings, problem.stopping.maxEvaluations - made,
-                               continues || problem.initialSample.includeInitialParameters, std::move(problem.bounds),
-                               problem.evaluator, problem.random, std::move(problem.feasibility));
+  auto dds = std::make_unique<Dds>(
+      settings, problem.stopping.maxEvaluations - made, continues || problem.initialSample.includeInitialParameters,
+      std::move(problem.bounds), problem.evaluator, problem.random, std::move(problem.feasibility));
+  if (!continues) dds->startFrom(std::move(problem.givenSample));
+  return dds;
 }
 
 std::unique_ptr<SearchAlgorithm> DdsMethod::make(SearchProblem problem) const {

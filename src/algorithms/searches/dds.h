@@ -6,6 +6,8 @@
 #include <optional>
 #include <span>
 #include <string_view>
+#include <utility>
+#include <vector>
 
 #include "algorithms/numbers/uniform_generator.h"
 #include "algorithms/searches/feasible_points.h"
@@ -37,13 +39,15 @@ class Dds final : public SearchAlgorithm {
   Dds(DdsSettings settings, int maxEvaluations, bool startFromInitial, SearchBounds bounds, Evaluator& evaluator,
       UniformGenerator& random, Feasibility feasibility = {});
 
-  /// Evaluates the start points in one batch: the initial set, or ddsStartPointCount(m) random ones. Returns
-  /// kDdsInvalidInput, without an evaluation, for a budget below 1 and for bounds that are missing, crossed or not
-  /// finite.
+  /// Evaluates the start points in one batch: the initial set, those given, or ddsStartPointCount(m) random ones.
+  /// Returns kDdsInvalidInput, without an evaluation, for a budget below 1 and for bounds that are missing, crossed or
+  /// not finite.
   SearchStatus initialise() override;
   /// Makes candidates until as many are under way as may be, and accepts or rejects the first of them, or all. Does
   /// nothing once terminated; kDdsInvalidInput before initialise().
   SearchStatus advance() override;
+  /// To be called before initialise(): the start points are the initial set, if the search starts from it, and these.
+  void startFrom(std::vector<ParameterSet> sets) { givenStarts_ = std::move(sets); }
   /// To be called before initialise(): makes no candidate after this evaluation, as if it had been cut off there.
   void endAfter(int evaluations) { lastEvaluation_ = evaluations; }
   bool isTerminated() const override { return !summary_.terminationMessage.empty(); }
@@ -78,6 +82,7 @@ class Dds final : public SearchAlgorithm {
   SearchSummary summary_;
   std::deque<Candidate> underWay_;      ///< submitted and not accepted or rejected, in order
   std::optional<ParameterSet> merged_;  ///< the next candidate, if it is not to be drawn
+  std::vector<ParameterSet> givenStarts_;
   int lastEvaluation_ = std::numeric_limits<int>::max();
   std::vector<int> replacedSteps_;    ///< by parameter, how many of its steps could not be run and were replaced
   std::vector<double> largestSteps_;  ///< by parameter, from the best set to a candidate
@@ -120,8 +125,8 @@ class DdsMethod : public SearchMethod {
   BoundSection section() override;
   std::vector<SearchDoubt> doubts() const override;
   std::string_view budgetRefusal() const override;
-  /// Random start points, unless it starts from the initial set.
-  bool evaluatesSample(const InitialSampleSettings& sample) const override { return !sample.includeInitialParameters; }
+  /// Several start points: random ones, unless it starts from the initial set, or those of an earlier run.
+  bool evaluatesSample(const InitialSampleSettings& sample) const override;
   std::int64_t sampleSize(const InitialSampleSettings& sample, int budget) const override;
   /// DDS perturbs ever fewer parameters as its budget is used up, so that another budget means another search. It
   /// starts from the best parameter set of the earlier one, whose evaluations are kept.

@@ -124,23 +124,6 @@ std::vector<std::size_t> parametersOfColumns(const std::vector<std::string_view>
   return parameters;
 }
 
-/// Transforms a model-scale value of parameter j to the search scale; empty if it is outside the bounds. A value that
-/// is past a bound by a rounding error only, as in a table printed by another program, is set to the bound.
-std::optional<double> toSearchScale(double value, std::size_t j, const SearchSpace& space) {
-  const bool isInteger = space.transformation[j] == TransformationType::integer;
-  const double lower = space.lower[j];
-  const double upper = isInteger ? space.upper[j] - 1.0 : space.upper[j];
-  bool failed = false;
-  const double transformed =
-      TransformParameterValue(value, lower, space.transformation[j], TransformDirection::forward, failed);
-  // The integer rule truncates towards zero, so that a value just below the lower bound would become the bound.
-  const double compared = isInteger ? value : transformed;
-  const double tolerance = 1.0e-12 * std::max({1.0, std::abs(lower), std::abs(upper)});
-  if (failed || !(compared >= lower - tolerance)) return std::nullopt;
-  if (!(transformed <= upper + tolerance)) return std::nullopt;
-  return std::clamp(transformed, lower, upper);
-}
-
 /// Adds the set of a row to the sample.
 void readRow(const std::vector<std::string_view>& cells, const std::vector<std::size_t>& parameters,
              const std::string& place, const SearchSpace& space, GivenSample& sample) {
@@ -157,7 +140,7 @@ void readRow(const std::vector<std::string_view>& cells, const std::vector<std::
       fatalError(kInvalidFile, fmt::format("{}: found \"{}\", expected a number for parameter \"{}\"", place,
                                            cells[column], space.names[j]));
     }
-    const std::optional<double> transformed = toSearchScale(*value, j, space);
+    const std::optional<double> transformed = sampleValue(*value, j, space);
     if (!transformed) {
       fatalError(kInvalidFile, fmt::format("{}: value {} of parameter \"{}\" lies outside its bounds", place,
                                            cells[column], space.names[j]));
@@ -175,6 +158,7 @@ const SettingSection<InitialSampleSection>& initialSampleSection() {
                                         {2, "scrambled Sobol"},
                                         {3, "maximin Latin hypercube"},
                                         {4, "from file"}};
+  static constexpr CodeName kOrders[] = {{std::nullopt, "best"}, {std::nullopt, "first"}};
   static const SettingSection<InitialSampleSection> section{
       {"OPTIMISATION_ALGORITHM/INITIAL_SAMPLE",
        "when `Option` is 2",
@@ -203,7 +187,32 @@ const SettingSection<InitialSampleSection>& initialSampleSection() {
                                       {.name = kInitialSampleFileKeyword,
                                        .type = KeywordType::fileName,
                                        .defaultValue = "''",
-                                       .meaning = "The file of generation 4."})}}};
+                                       .meaning = "The file of generation 4."}),
+        setting<InitialSampleSection>([](auto& s) -> auto& { return s.sample.earlierFile; },
+                                      {.name = kEarlierFileKeyword,
+                                       .type = KeywordType::fileName,
+                                       .defaultValue = kNoDefault,
+                                       .meaning = "The result file of an earlier run, of this or another setup with "
+                                                  "the same variable parameters: sets of it come behind the initial "
+                                                  "one, and the rest of the sample is drawn. Their model runs are "
+                                                  "made anew."}),
+        choice<InitialSampleSection>(
+            [](InitialSampleSection& s, const SetupValue& value) {
+              const auto& name = std::get<std::string>(value);
+              s.sample.earlierOrder = name == kOrders[0].name ? EarlierOrder::best : EarlierOrder::first;
+            },
+            {.name = kEarlierOrderKeyword,
+             .defaultValue = kNoDefault,
+             .codes = kOrders,
+             .meaning = "Which of its successful evaluations: those with the least aggregate, or the first. Without "
+                        "it, the best."}),
+        setting<InitialSampleSection>([](auto& s) -> auto& { return s.sample.mostEarlierSets; },
+                                      {.name = kEarlierSetsKeyword,
+                                       .defaultValue = kNoDefault,
+                                       .range = from(1),
+                                       .refusal = "Error: No. of sets of the earlier result file invalid",
+                                       .meaning = "How many different sets at most. Without it, as many as the "
+                                                  "population has room for; one for DDS and PDDS."})}}};
   return section;
 }
 
@@ -216,6 +225,21 @@ SearchBounds searchBounds(const SearchSpace& space) {
     if (bounds.isInteger[j]) bounds.upper[j] -= kBelowNextInteger;
   }
   return bounds;
+}
+
+std::optional<double> sampleValue(double value, std::size_t j, const SearchSpace& space) {
+  const bool isInteger = space.transformation[j] == TransformationType::integer;
+  const double lower = space.lower[j];
+  const double upper = isInteger ? space.upper[j] - 1.0 : space.upper[j];
+  bool failed = false;
+  const double transformed =
+      TransformParameterValue(value, lower, space.transformation[j], TransformDirection::forward, failed);
+  // The integer rule truncates towards zero, so that a value just below the lower bound would become the bound.
+  const double compared = isInteger ? value : transformed;
+  const double tolerance = 1.0e-12 * std::max({1.0, std::abs(lower), std::abs(upper)});
+  if (failed || !(compared >= lower - tolerance)) return std::nullopt;
+  if (!(transformed <= upper + tolerance)) return std::nullopt;
+  return std::clamp(transformed, lower, upper);
 }
 
 std::vector<ParameterSet> drawInitialSample(const InitialSampleSettings& settings,
@@ -233,15 +257,18 @@ std::vector<ParameterSet> drawInitialSample(const InitialSampleSettings& setting
     sample.insert(sample.end(), givenSets.begin(), givenSets.begin() + static_cast<std::ptrdiff_t>(drawn));
     return sample;
   }
-  for (const auto& point : drawUnitPoints(settings.generation, drawn, bounds.size(), random)) {
+  const std::size_t given = std::min(givenSets.size(), drawn);
+  sample.insert(sample.end(), givenSets.begin(), givenSets.begin() + static_cast<std::ptrdiff_t>(given));
+  if (given == drawn) return sample;
+  for (const auto& point : drawUnitPoints(settings.generation, drawn - given, bounds.size(), random)) {
     sample.push_back(withinBounds(point, bounds));
   }
   return sample;
 }
 
-std::size_t givenSetCount(const InitialSampleSettings& settings, std::size_t count) {
+std::size_t givenSetCount(const InitialSampleSettings& settings, std::size_t givenSets, std::size_t count) {
   if (settings.generation == SampleGeneration::fromFile) return count;
-  return settings.includeInitialParameters ? std::min<std::size_t>(1, count) : 0;
+  return std::min((settings.includeInitialParameters ? 1 : 0) + givenSets, count);
 }
 
 GivenSample readInitialSample(std::string_view fileName, std::string_view text, const SearchSpace& space) {

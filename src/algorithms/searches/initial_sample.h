@@ -2,6 +2,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <optional>
 #include <span>
 #include <string>
 #include <string_view>
@@ -9,6 +10,7 @@
 
 #include "algorithms/numbers/search_bounds.h"
 #include "algorithms/numbers/uniform_generator.h"
+#include "algorithms/searches/earlier_results.h"
 #include "common/parameter_set.h"
 #include "common/settings/keyword_row.h"
 #include "parameters/search_space.h"
@@ -28,6 +30,11 @@ struct InitialSampleSettings {
   bool includeInitialParameters = true;
   SampleGeneration generation = SampleGeneration::latinHypercube;
   std::string fileName;  ///< absolute; only for a sample from a file
+  /// A result file of an earlier run, absolute, whose sets come behind the initial one; empty: none.
+  std::string earlierFile = {};
+  EarlierOrder earlierOrder = EarlierOrder::best;
+  std::int32_t mostEarlierSets = 0;  ///< 0: as many as there is room for; a search without a population takes one
+  std::size_t earlierSetCount = 0;   ///< that were found in the file
 };
 
 /// The section INITIAL_SAMPLE, and the seed of the run, which the uncertainty analysis sets, too.
@@ -38,6 +45,9 @@ struct InitialSampleSection {
 const SettingSection<InitialSampleSection>& initialSampleSection();
 /// The keyword of `fileName`.
 inline constexpr std::string_view kInitialSampleFileKeyword = "Initial_Sample_File_Name";
+inline constexpr std::string_view kEarlierFileKeyword = "Earlier_Result_File";
+inline constexpr std::string_view kEarlierOrderKeyword = "Earlier_Result_Order";
+inline constexpr std::string_view kEarlierSetsKeyword = "Earlier_Result_Sets";
 
 /// The bounds that the searches keep to. The upper bound of an integer parameter is moved in a little: a point on it,
 /// or below it by less than the tolerance of the integer rule, would become an integer beyond the bound of the
@@ -52,13 +62,17 @@ struct GivenSample {
 
 /// Draws `count` sets within the bounds; with `includeInitialParameters` the first is the initial set, followed by a
 /// sample of count − 1. For a sample from a file `givenSets` are those of readInitialSample(); the first of them are
-/// used. Throws FatalError when there are too few.
+/// used. Throws FatalError when there are too few. Otherwise they come before those that are drawn.
 std::vector<ParameterSet> drawInitialSample(const InitialSampleSettings& settings,
                                             std::span<const ParameterSet> givenSets, const SearchBounds& bounds,
                                             std::size_t count, UniformGenerator& random);
 
-/// The number of sets at the beginning of such a sample that the setup gives.
-std::size_t givenSetCount(const InitialSampleSettings& settings, std::size_t count);
+/// The number of sets at the beginning of such a sample that the setup gives, of which `givenSets` come from a file.
+std::size_t givenSetCount(const InitialSampleSettings& settings, std::size_t givenSets, std::size_t count);
+
+/// The value of parameter j on the search scale for one on the model scale; empty if it is outside the bounds. A value
+/// that is past a bound by a rounding error only, as in a table printed by another program, is set to the bound.
+std::optional<double> sampleValue(double value, std::size_t j, const SearchSpace& space);
 
 /// Reads a sample: a header row with the names of the variable parameters in any order, then one set per row on the
 /// model scale; blank lines and lines that start with `#` are skipped, and so is a byte-order mark. Columns are

@@ -29,7 +29,8 @@ SearchStatus PopulationSearch::initialise() {
   const std::size_t count = std::min(populationSize(), static_cast<std::size_t>(problem_.stopping.maxEvaluations));
   std::vector<ParameterSet> sample =
       drawInitialSample(problem_.initialSample, problem_.givenSample, problem_.bounds, count, problem_.random);
-  feasible_.replaceInSample(sample, givenSetCount(problem_.initialSample, count), problem_.bounds, problem_.random);
+  feasible_.replaceInSample(sample, givenSetCount(problem_.initialSample, problem_.givenSample.size(), count),
+                            problem_.bounds, problem_.random);
   std::vector<EvaluationResult> results = run(sample, DispatchMode::task);
   problem_.evaluator.settleAggregates(results);
   for (std::size_t i = 0; i < count && problem_.selector; ++i) problem_.selector->note(sample[i], results[i]);

@@ -26,7 +26,7 @@ struct SearchProblem {
   SearchBounds bounds;
   StoppingCriteria stopping;
   InitialSampleSettings initialSample;
-  std::vector<ParameterSet> givenSample;  ///< search scale; the sets of the initial sample file
+  std::vector<ParameterSet> givenSample;  ///< search scale; of the initial sample file or of an earlier run
   Evaluator& evaluator;
   UniformGenerator& random;
   ProposalSelector* selector = nullptr;             ///< of a surrogate-assisted search

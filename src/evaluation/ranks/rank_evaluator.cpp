@@ -6,6 +6,7 @@
 
 #include <fmt/core.h>
 
+#include "common/clock.h"
 #include "common/fatal_error.h"
 
 namespace mirevo {
@@ -35,7 +36,7 @@ RankEvaluator::RankEvaluator(ModelRunner& runner, Job& job, WorkerWatch& watch, 
 std::vector<EvaluationResult> RankEvaluator::evaluateParameterSets(std::span<const ParameterSet> sets,
                                                                    DispatchMode mode) {
   assert(!ledger_.isOpen());
-  ledger_.open(sets, mode);
+  ledger_.open(sets, mode, workers_.size());
   startOnFreeWorkers();
   while (!ledger_.isComplete()) goOn();
   return ledger_.end();
@@ -88,8 +89,8 @@ bool RankEvaluator::startNext(int rank) {
       worker(rank).set = *place;
       watch_.handOut(rank, ledger_.numberOf(*place));
       noteWhetherFree(rank);
-      ledger_.markInitiated(*place);
-      worker(rank).isRunning = true;
+      ledger_.markInitiated(*place, runTimeClock());
+      worker(rank).running = place;
       return true;
     }
     ledger_.finish(*place, runner_.failedResult(std::move(*failure)));
@@ -130,7 +131,7 @@ void RankEvaluator::handle(const Message& message) {
 
 void RankEvaluator::takeResult(int rank, ResultMessage message) {
   const WorkerWatch::Held held = takeHeld(rank);
-  noteEnd(rank);
+  noteEnd(rank, false);
   for (const std::string& text : std::exchange(message.warnings, {})) observer_.warning(text);
   const bool isOfAnother = worker(rank).isLate && worker(rank).set;
   if (isFirst(rank, message.result.ok() && message.result.unkeptFiles.empty())) {
@@ -145,8 +146,10 @@ void RankEvaluator::takeResult(int rank, ResultMessage message) {
   noteWhetherFree(rank);
 }
 
-void RankEvaluator::noteEnd(int rank) {
-  if (std::exchange(worker(rank).isRunning, false)) ledger_.markEnded();
+void RankEvaluator::noteEnd(int rank, bool isLost) {
+  if (const auto place = std::exchange(worker(rank).running, std::nullopt)) {
+    ledger_.markEnded(*place, runTimeClock(), isLost);
+  }
 }
 
 bool RankEvaluator::isFirst(int rank, bool isWhole) {
@@ -169,7 +172,7 @@ void RankEvaluator::takeFailure(int rank, const FailureMessage& failure) {
   const bool hasNothing = failed.isLate || (watch_.heldBy(rank) && !failed.set);
   if (!hasNothing) failWith(rank, failure);
   watch_.takeBack(rank);
-  noteEnd(rank);
+  noteEnd(rank, true);
   late_.erase(rank);
   failed.isLate = false;
   failed.set.reset();
@@ -196,7 +199,7 @@ bool RankEvaluator::isAnyLeft() const {
 void RankEvaluator::loseWorker(int rank) {
   Worker& lost = worker(rank);
   const auto& held = watch_.heldBy(rank);
-  noteEnd(rank);
+  noteEnd(rank, true);
   noteWhetherFree(rank);
   const std::string who = fmt::format("W{}", nameOf(rank).substr(1));
   const std::string why = watch_.hasEnded(rank)
@@ -259,7 +262,7 @@ WorkerWatch::Held RankEvaluator::takeHeld(int rank) {
 
 void RankEvaluator::giveUp(int rank, const GivenUpMessage& message) {
   takeHeld(rank);
-  noteEnd(rank);
+  noteEnd(rank, true);
   Worker& givenUp = worker(rank);
   const auto set = std::exchange(givenUp.set, std::nullopt);
   late_.erase(rank);

@@ -41,7 +41,7 @@ class RankEvaluator final : public Evaluator {
     std::optional<ResultMessage> answer;  ///< waits for the first successful run, see EvaluationLedger::judge()
     bool isGivenUp = false;               ///< its process folder cannot be used any more
     bool isLate = false;                  ///< its set was put back
-    bool isRunning = false;               ///< it makes a model run, as far as is known
+    std::optional<std::size_t> running;   ///< place of the set whose model it runs, as far as is known
   };
 
   /// Waits for a message, takes the results that can be judged, and sends the next sets.
@@ -53,8 +53,8 @@ class RankEvaluator final : public Evaluator {
   bool startNext(int rank);
   void handle(const Message& message);
   void takeResult(int rank, ResultMessage message);
-  /// The model run of the worker has ended, or nobody will hear of its end.
-  void noteEnd(int rank);
+  /// The model run of the worker has ended, or `isLost`: nobody will hear of its end.
+  void noteEnd(int rank, bool isLost);
   /// The set that the worker has answered. Throws FatalError if it has none.
   WorkerWatch::Held takeHeld(int rank);
   /// Whether the result of the worker counts. If it was taken for lost: only one that `isWhole` and comes before that

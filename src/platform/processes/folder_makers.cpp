@@ -158,10 +158,9 @@ class FolderMakers final {
     closeDescriptors(STDERR_FILENO + 1, pipe - 1);  // locks are the program's
     closeDescriptors(pipe + 1);
     const auto refuse = [this, pipe](std::string_view error, std::string_view detail) {
-      if (!shared().hasError.exchange(true)) {
-        setText(shared().error, error);
-        setText(shared().detail, detail);
-      }
+      if (shared().hasError.exchange(true)) ::_exit(1);  // the first one tells when its text is there
+      setText(shared().error, error);
+      setText(shared().detail, detail);
       const char failed = 1;
       [[maybe_unused]] const ssize_t written = ::write(pipe, &failed, 1);
       ::_exit(1);

@@ -125,6 +125,7 @@ bool HelperProcess::isRunning() const {
 }
 
 void HelperProcess::end() {
+  if (process_ <= 0) return;  // and how it ended is still asked for
   if (isOwn()) {
     ::kill(process_, SIGKILL);
     endAndDescribe();
@@ -161,6 +162,11 @@ HelperProcess::Outcome HelperProcess::receiveArrived(std::string& bytes) const {
       return Outcome::done;
     }
   }
+}
+
+bool HelperProcess::hasAnswer() const {
+  pollfd ready{socket_, POLLIN, 0};
+  return socket_ >= 0 && ::poll(&ready, 1, 0) == 1;
 }
 
 HelperProcess::Outcome HelperProcess::transfer(char* bytes, std::size_t size, bool isSending, ReadingWatch& watch) {

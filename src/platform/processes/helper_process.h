@@ -34,6 +34,8 @@ class HelperProcess final {
   /// it with SIGXCPU, one of its memory with an answer.)
   bool wasKilled() const { return wasKilled_; }
 
+  /// Whether receive() has something to take at once, be it that the process has ended.
+  bool hasAnswer() const;
   /// Both wait until all of the bytes are through, the process has ended, or the time of `watch` is over.
   Outcome send(const void* bytes, std::size_t size, ReadingWatch& watch);
   Outcome receive(void* bytes, std::size_t size, ReadingWatch& watch);

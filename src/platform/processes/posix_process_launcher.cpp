@@ -52,6 +52,16 @@ constexpr double kLeftSeconds = 2.0;
 /// Between two looks at what a batch has left, and at a batch where the kernel has no pidfd to wait with.
 constexpr double kLeftLookSeconds = 0.002;
 constexpr double kUnwatchedSeconds = 0.02;
+/// A batch system that ends a job sends the signal to all its processes, one after the other. Where the model has it
+/// first, the program waits this long for its own before it takes the end of the model for a failure, which a restart
+/// would keep.
+constexpr double kRequestSeconds = 0.5;
+
+/// Whether the signal may have been meant for the whole job: a request to end or, after that, a kill.
+bool mayEndJob(int signal) {
+  constexpr std::array kSignals{SIGINT, SIGTERM, SIGHUP, SIGQUIT, SIGXCPU, SIGKILL};
+  return std::find(kSignals.begin(), kSignals.end(), signal) != kSignals.end();
+}
 
 std::string baseName(const std::string& path) {
   return std::filesystem::path(path).filename().string();
@@ -274,12 +284,13 @@ void PosixProcessLauncher::prepareEnvironment(bool useSingleThread) {
   environment_.insert(environment_.end(), 2, nullptr);
 }
 
-bool PosixProcessLauncher::renewFolder(int slotNumber) {
+bool PosixProcessLauncher::renewFolder(int slotNumber, const std::function<void()>& look) {
   const std::string& folder = slotAt(slotNumber).folder;
   try {
-    CopyProgress unseen;
-    makeProcessFolderAnew(listFolder(baseFolder_, processFolderPrefix_), folder, {ownFiles_, linksReadOnlyFiles_},
-                          unseen);
+    const std::function<void()> looking = everyTenthOfSecond(look ? look : [] {});
+    CopyProgress progress(nullptr, looking);
+    makeProcessFolderAnew(listFolder(baseFolder_, processFolderPrefix_, looking), folder,
+                          {ownFiles_, linksReadOnlyFiles_}, progress);
     makeFilesOwn(folder, baseFolder_, ownFiles_, processFolderPrefix_);
   } catch (const FatalError& error) {
     lastError_ = textOf(error);
@@ -320,6 +331,7 @@ void PosixProcessLauncher::createProcesses(int slotNumber) {
   slot.started = clock_();
   slot.unseen = 0.0;
   slot.overdue.reset();
+  slot.heldBack.reset();
   if (!renewLog(slot)) {
     slot.failure = {
         BatchFailure::Kind::couldNotStart, errno,
@@ -371,8 +383,9 @@ void PosixProcessLauncher::isExecuting(int slotNumber, std::int32_t& executing, 
     const std::string last = baseName(slot.commands[slot.item].file());
     slot.isEnding = !left_->areGone(slotNumber, last, clock_());
   }
+  if (slot.heldBack && clock_() >= *slot.heldBack) slot.heldBack.reset();
   slot.unseen = 0.0;
-  executing = slot.group > 0 || slot.isEnding ? 1 : 0;
+  executing = isBusy(slot) ? 1 : 0;
   status = static_cast<std::int32_t>(slot.failure.kind == BatchFailure::Kind::none ? BatchStatus::succeeded
                                                                                    : BatchStatus::failed);
 }
@@ -386,10 +399,12 @@ void PosixProcessLauncher::finishItem(Slot& slot, int code, int status) {
                     fmt::format("{} was ended because it ran longer than {:g} seconds", name, maxSeconds_)};
   } else if (code != CLD_EXITED) {
     slot.failure = {BatchFailure::Kind::signal, status, fmt::format("{} {}", name, endedBySignal(status))};
+    if (mayEndJob(status)) slot.heldBack = clock_() + kRequestSeconds;
   } else if (status != 0) {
     slot.failure = {
         BatchFailure::Kind::exitCode, status,
         fmt::format("{} exited with code {}{}", name, status, meaningOfCode(status, slot.commands[slot.item].file()))};
+    if (mayEndJob(status - 128)) slot.heldBack = clock_() + kRequestSeconds;  // as shells tell of it
   } else if (slot.item + 1 < slot.commands.size()) {
     ++slot.item;
     slot.started = std::min(slot.started + slot.unseen, clock_());
@@ -411,6 +426,7 @@ void PosixProcessLauncher::endOverdue(Slot& slot) {
 /// Seconds until a batch that is not over must be checked even if its process has not ended.
 double PosixProcessLauncher::secondsToLook(const Slot& slot) const {
   constexpr double kShortest = 0.001;
+  if (slot.group == 0 && !slot.isEnding && slot.heldBack) return std::max(*slot.heldBack - clock_(), kShortest);
   if (slot.group == 0) return kLeftLookSeconds;
   const double unwatched = slot.pidfd >= 0 ? std::numeric_limits<double>::infinity() : kUnwatchedSeconds;
   double limit = 0.0;
@@ -470,7 +486,7 @@ void PosixProcessLauncher::waitForChange(double seconds, std::span<const int> re
   bool isNeeded = !readable.empty();
   for (const int descriptor : readable) watched.push_back({descriptor, POLLIN, 0});
   for (const Slot& slot : slots_) {
-    if (slot.group == 0 && !slot.isEnding) continue;
+    if (!isBusy(slot)) continue;
     isNeeded = true;
     seconds = std::min(seconds, secondsToLook(slot));
     if (slot.pidfd >= 0) watched.push_back({slot.pidfd, POLLIN, 0});
@@ -485,7 +501,10 @@ void PosixProcessLauncher::waitForChange(double seconds, std::span<const int> re
 
 void PosixProcessLauncher::haltProcesses() {
   haltGroups();
-  for (Slot& slot : slots_) slot.isEnding = false;
+  for (Slot& slot : slots_) {
+    slot.isEnding = false;
+    slot.heldBack.reset();
+  }
   if (left_) left_->endAll(kLeftSeconds);
   if (guard_) mark_.endBearers();  // without a guard no process was started
 }

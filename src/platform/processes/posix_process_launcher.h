@@ -35,7 +35,7 @@ class PosixProcessLauncher final : public ProcessLauncher {
 
   bool initialise(const LauncherSettings& settings) override;
   const std::string& lastError() const override { return lastError_; }
-  bool renewFolder(int slot) override;
+  bool renewFolder(int slot, const std::function<void()>& look) override;
   std::string getProcessFolder(int slot) const override;
   void createProcesses(int slot) override;
   void isExecuting(int slot, std::int32_t& executing, std::int32_t& status) override;
@@ -61,6 +61,7 @@ class PosixProcessLauncher final : public ProcessLauncher {
     double started = 0.0;                ///< when the batch began
     double unseen = 0.0;                 ///< seconds without a look at the batch, since the last one
     std::optional<double> overdue;       ///< when it was sent SIGTERM because it ran too long
+    std::optional<double> heldBack;      ///< until when its end is not told, see kRequestSeconds
     int log = -1;  ///< open for the whole run, so that a model run that prints nothing creates no file
     BatchFailure failure;
   };
@@ -78,6 +79,7 @@ class PosixProcessLauncher final : public ProcessLauncher {
   void startItem(Slot& slot);
   void finishItem(Slot& slot, int code, int status);
   void endOverdue(Slot& slot);
+  bool isBusy(const Slot& slot) const { return slot.group > 0 || slot.isEnding || slot.heldBack; }
   double secondsToLook(const Slot& slot) const;
   void endRestOfGroup(Slot& slot);
   void haltGroups();

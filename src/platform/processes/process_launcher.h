@@ -18,7 +18,7 @@ struct BatchItem {
 };
 
 struct LauncherSettings {
-  std::string baseFolder;                  ///< absolute; folder of the first batch file; copied, never written to
+  std::string baseFolder;                  ///< absolute; with all files of the model; copied, never written to
   std::string processFolderPrefix;         ///< absolute; the slot's folder without its number, which follows
   std::vector<BatchItem> batchItems;       ///< at least one
   std::vector<std::string> ownFiles = {};  ///< below the base folder, with their leading "/": in no other slot's folder
@@ -71,8 +71,8 @@ class ProcessLauncher {
   virtual const std::string& lastError() const = 0;
 
   /// Makes the process folder of a slot that runs nothing once more such a copy, whatever has become of it. False when
-  /// that fails; lastError() says why.
-  virtual bool renewFolder(int slot) = 0;
+  /// that fails; lastError() says why. `look`, if any, is called ten times a second and may throw to end it.
+  virtual bool renewFolder(int slot, const std::function<void()>& look) = 0;
 
   /// Absolute path of the slot's folder, without a trailing separator.
   virtual std::string getProcessFolder(int slot) const = 0;

@@ -19,6 +19,7 @@
 #include "platform/series/csv_cells.h"
 #include "platform/series/missing_marker.h"
 #include "platform/series/series_reading.h"
+#include "platform/series/text_layout.h"
 
 namespace mirevo {
 namespace {
@@ -81,8 +82,6 @@ bool isHeadingOfHours(std::string_view heading) {
   return std::find(kHeadings.begin(), kHeadings.end(), toLowerAscii(letters)) != kHeadings.end();
 }
 
-constexpr std::string_view kMissing = "missing";
-
 }  // namespace
 
 bool CsvTimeSeries::open(const std::string& fileName) {
@@ -142,10 +141,8 @@ bool CsvTimeSeries::readPreamble(std::size_t& position) {
 }
 
 bool CsvTimeSeries::readMissingMark(std::string_view line, std::size_t number) {
-  std::string_view text = trim(line.substr(1));
-  const bool isNamed = equalIgnoringCase(text.substr(0, kMissing.size()), kMissing);
-  if (isNamed) text = trim(text.substr(kMissing.size()));
-  if (!isNamed || text.empty() || text.front() != '=') {  // a comment about other things, perhaps
+  const auto mark = missingMark(line.substr(1));
+  if (!mark) {  // a comment about other things, perhaps
     if (const std::string_view marker = numberMeantAsMissing(line); !marker.empty()) {
       markDoubts_.push_back(
           {fmt::format("{}:{}: this comment marks no missing values; if {} is one, the line must be \"# missing = {}\"",
@@ -154,7 +151,7 @@ bool CsvTimeSeries::readMissingMark(std::string_view line, std::size_t number) {
     }
     return true;
   }
-  text = trim(text.substr(1));
+  const std::string_view text = *mark;
   const std::optional<float> value = csv::parseCell(text.data(), text.data() + text.size());
   if (!value || text.empty()) {
     const char* const at = text.empty() ? line.data() + line.size() : text.data();
@@ -264,6 +261,14 @@ std::vector<std::string> CsvTimeSeries::doubts() const {
   doubts.push_back(fmt::format("{}: column 2 is called {} and is read as item No. 1, not as a part of the time; {}",
                                sourceName_, quotedForMessage(itemName(1)), kOneColumn));
   return doubts;
+}
+
+std::string CsvTimeSeries::firstLines() const {
+  const std::string lines = describeFirstLines(content_, TextForm());
+  return lines.empty() ? lines
+                       : lines +
+                             "\nHeader_Rows, Column_Separator, Time_Format and other keywords of the section tell how "
+                             "a text file of another form is to be read";
 }
 
 bool CsvTimeSeries::isOver() {

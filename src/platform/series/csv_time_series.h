@@ -35,6 +35,7 @@ class CsvTimeSeries final : public StoredTimeSeries {
   /// A time of day in a column of its own, which would be the first item; comments that seem to mark missing values in
   /// another way, or a second time.
   std::vector<std::string> doubts() const override;
+  std::string firstLines() const override;
 
  private:
   struct MarkDoubt {

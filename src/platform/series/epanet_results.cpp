@@ -142,10 +142,11 @@ std::string EpanetResults::itemName(int item) const {
 
 std::string EpanetResults::itemUnit(int item) const {
   if (!hasItem(item)) return {};
-  constexpr std::array<std::string_view, 10> kFlows = {"ft3/s", "gal/min", "Mgal/d", "imp. Mgal/d", "acre ft/d",
-                                                       "L/s",   "L/min",   "ML/d",   "m3/h",        "m3/d"};
-  // So the engine writes them; its documentation has the last two the other way round.
-  constexpr std::array<std::string_view, 3> kPressures = {"psi", "kPa", "m"};
+  // The last flow and the last two pressures are those of version 2.3.
+  constexpr std::array<std::string_view, 11> kFlows = {"ft3/s", "gal/min", "Mgal/d", "imp. Mgal/d", "acre ft/d", "L/s",
+                                                       "L/min", "ML/d",    "m3/h",   "m3/d",        "m3/s"};
+  // So the engine writes them; its documentation has kPa and m the other way round.
+  constexpr std::array<std::string_view, 5> kPressures = {"psi", "kPa", "m", "bar", "ft"};
   constexpr std::array<std::string_view, 4> kQualities = {"", "mg/L", "h", "%"};
   const auto flow = static_cast<std::size_t>(head_[kFlowUnits]);
   const auto pressure = static_cast<std::size_t>(head_[kPressureUnits]);

@@ -56,4 +56,13 @@ std::string_view numberMeantAsMissing(std::string_view comment) {
   return {};
 }
 
+std::optional<std::string_view> missingMark(std::string_view comment) {
+  constexpr std::string_view kMissing = "missing";
+  std::string_view text = trim(comment);
+  if (!equalIgnoringCase(text.substr(0, kMissing.size()), kMissing)) return std::nullopt;
+  text = trim(text.substr(kMissing.size()));
+  if (text.empty() || text.front() != '=') return std::nullopt;
+  return trim(text.substr(1));
+}
+
 }  // namespace mirevo

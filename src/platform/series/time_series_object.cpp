@@ -20,6 +20,7 @@
 #include "platform/series/rdb_time_series.h"
 #include "platform/series/series_reading.h"
 #include "platform/series/swmm_results.h"
+#include "platform/series/text_table.h"
 #include "platform/series/xml_time_series.h"
 
 namespace mirevo {
@@ -60,6 +61,24 @@ std::string endingOf(const std::string& fileName) {
 bool hasEnding(const SeriesFormat& format, std::string_view ending) {
   const std::vector<std::string_view> endings = splitAt(format.endings, ' ');
   return std::find(endings.begin(), endings.end(), ending) != endings.end();
+}
+
+/// Why a file cannot be a text table of a form that the setup states; empty if it can. `.out` is an ending of listings,
+/// too, in which there is no zero byte.
+std::string faultOfTextEnding(const std::string& fileName) {
+  const std::string ending = endingOf(fileName);
+  const auto* const other = std::find_if(std::begin(kFormats), std::end(kFormats),
+                                         [&](const SeriesFormat& format) { return hasEnding(format, ending); });
+  if (other == std::begin(kFormats) || other == std::end(kFormats)) return {};
+  if (ending == ".out") {
+    std::string ignored;
+    const auto head = readFileHead(std::string(trimTrailing(fileName)), ignored);
+    if (!head || head->find('\0') == std::string::npos) return {};
+  }
+  return fmt::format(
+      "this tells how a text table is to be read, and {} is a file of another format, which says itself "
+      "how it is read: leave out the keywords of text tables, or export the series as text",
+      ending);
 }
 
 /// Index of the first step not earlier than `days`, with the tolerance kSameTimeDays; the number of steps when there is
@@ -118,13 +137,15 @@ std::optional<Value> extractValue(std::span<const double> times, std::span<const
 
 }  // namespace
 
-bool isTextSeries(const std::string& fileName) {
-  return std::any_of(std::begin(kFormats), std::end(kFormats), [ending = endingOf(fileName)](const auto& format) {
-    return format.isText && hasEnding(format, ending);
-  });
+bool isTextSeries(const std::string& fileName, const TextForm& form) {
+  return form.isGiven ||
+         std::any_of(std::begin(kFormats), std::end(kFormats), [ending = endingOf(fileName)](const auto& format) {
+           return format.isText && hasEnding(format, ending);
+         });
 }
 
-std::string howToMarkMissing(const std::string& fileName, float value) {
+std::string howToMarkMissing(const std::string& fileName, float value, const TextForm& form) {
+  if (form.isGiven) return fmt::format("write Missing_Value = {} in the section that names the file", value);
   const std::string ending = endingOf(fileName);
   if (ending == ".nc") return "make it the attribute missing_value of the variable";
   const bool isTable = hasEnding(kFormats[0], ending);
@@ -133,9 +154,14 @@ std::string howToMarkMissing(const std::string& fileName, float value) {
 }
 
 std::unique_ptr<TimeSeriesObject> createTimeSeriesObject(const std::string& fileName, std::string& reason,
-                                                         std::shared_ptr<SeriesReading> reading) {
+                                                         std::shared_ptr<SeriesReading> reading, const TextForm& form) {
   if (!reading) reading = std::make_shared<SeriesReading>();
   const std::string ending = endingOf(fileName);
+  if (form.isGiven) {
+    reason = faultOfTextEnding(fileName);
+    if (!reason.empty()) return nullptr;
+    return std::make_unique<TextTable>(form, std::move(reading));
+  }
   std::vector<std::string_view> known;
   const SeriesFormat* found = nullptr;
   std::optional<std::string> head;

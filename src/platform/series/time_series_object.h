@@ -11,6 +11,7 @@
 #include <vector>
 
 #include "common/date_record.h"
+#include "platform/series/text_form.h"
 
 namespace mirevo {
 
@@ -42,6 +43,9 @@ class TimeSeriesObject {
   virtual std::string itemUnit(int /*item*/) const { return {}; }
   /// What in the open file seems to be meant in another way than it is read, one warning each.
   virtual std::vector<std::string> doubts() const { return {}; }
+  /// The first lines of a text file as they were understood, for a person who is told that it cannot be read; each
+  /// begins with a line end. Empty for other formats.
+  virtual std::string firstLines() const { return {}; }
 
   /// Makes the values of the item available; false (with lastError()) when they cannot be read.
   virtual bool getData(int item) = 0;
@@ -62,13 +66,15 @@ struct SeriesReading;
 
 /// An object of the class for the ending of the file name, and for the first bytes of the file where formats share the
 /// ending; nullptr for an unknown ending. `reason` then names the known ones. Series of the same run share a `reading`;
-/// null: one of its own.
+/// null: one of its own. With a `form` that is given, a text table of this form, whatever the ending; nullptr, with
+/// `reason`, for one of another format.
 std::unique_ptr<TimeSeriesObject> createTimeSeriesObject(const std::string& fileName, std::string& reason,
-                                                         std::shared_ptr<SeriesReading> reading = nullptr);
+                                                         std::shared_ptr<SeriesReading> reading = nullptr,
+                                                         const TextForm& form = {});
 /// Whether a series file of this name is text, of which a damaged one may have no end.
-bool isTextSeries(const std::string& fileName);
+bool isTextSeries(const std::string& fileName, const TextForm& form = {});
 /// What a user does to mark a value as missing in a series file of this name: "write ...".
-std::string howToMarkMissing(const std::string& fileName, float value);
+std::string howToMarkMissing(const std::string& fileName, float value, const TextForm& form = {});
 
 /// A name with its unit in brackets at the end, "Discharge [m3/s]" or "Discharge (m3/s)", in two parts; the second is
 /// empty where there are none.

@@ -40,8 +40,8 @@ void validateInBaseFolder(const std::string& path, const std::string& baseFolder
   section.refuse(
       fmt::format("Error: The file {} is not located in the base folder {}", shown(path, keyword, section), baseFolder),
       keyword,
-      fmt::format("expected a file in or below the folder of the first BatchFileName, which each model run "
-                  "copies; found {}",
+      fmt::format("expected a file in or below Base_Folder or, without one, the folder of the first BatchFileName, "
+                  "which each model run copies; found {}",
                   path));
 }
 

@@ -372,8 +372,8 @@ void SetupSection::checkRange(const KeywordRow& row, const BoundSection& section
     message += section.row->itemName != nullptr ? section.row->itemName(section.settings) : name();
   }
   refuse(message, row.name(),
-         fmt::format("expected {}, found {}{}", row.facts.range.text(), formatReal(number),
-                     namesWithoutNumber(row.facts.codes)));
+         fmt::format("expected {}{}, found {}", row.facts.range.text(), orOneOfTheNames(row.facts.codes),
+                     formatReal(number)));
 }
 
 std::size_t SetupSection::readCount(std::string_view itemPrefix) const {

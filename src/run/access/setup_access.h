@@ -139,6 +139,8 @@ class SetupSection final {
   const std::string& path() const { return path_; }
   /// The keyword's text as written in the setup, without trailing blanks; empty if it is absent.
   std::string written(std::string_view keyword) const;
+  /// Whether there is a section of this name inside this one.
+  bool has(std::string_view name) const { return node_->section(name) != nullptr; }
   bool isWritten(std::string_view keyword) const { return node_->keyword(keyword) != nullptr; }
 
  private:

@@ -158,12 +158,11 @@ std::string wantedCode(std::span<const CodeName> codes) {
   return fmt::format("{} or one of the names {}", wanted(KeywordType::code), names);
 }
 
-std::string namesWithoutNumber(std::span<const CodeName> codes) {
+std::string orOneOfTheNames(std::span<const CodeName> codes) {
+  if (std::ranges::all_of(codes, [](const CodeName& code) { return code.code.has_value(); })) return {};
   std::string names;
-  for (const CodeName& code : codes) {
-    if (!code.code) names += fmt::format("{}'{}'", names.empty() ? "; without a number are " : ", ", code.name);
-  }
-  return names;
+  for (const CodeName& code : codes) names += fmt::format("{}'{}'", names.empty() ? "" : ", ", code.name);
+  return " or one of the names " + names;
 }
 
 std::string nearestCode(std::span<const CodeName> codes, std::string_view written) {

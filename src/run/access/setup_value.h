@@ -23,8 +23,8 @@ std::variant<SetupValue, SetupValueError> convertSetupValue(const KeywordRow& ro
 
 /// What a coded keyword accepts: "an integer within 32 bits or one of the names 'SCE', 'PSE'".
 std::string wantedCode(std::span<const CodeName> codes);
-/// "; without a number are 'NSE', 'KGE'": the values that have no number; empty if all have one.
-std::string namesWithoutNumber(std::span<const CodeName> codes);
+/// " or one of the names 'SCE', 'PSE', 'PDDS'"; empty if each of them has a number, too.
+std::string orOneOfTheNames(std::span<const CodeName> codes);
 /// ", did you mean 'PSE'?" if a name is similar to what was written; else empty.
 std::string nearestCode(std::span<const CodeName> codes, std::string_view written);
 

@@ -28,7 +28,8 @@ constexpr std::string_view kLastLine = "End";
 
 bool namesAFileOfResults(const ResultSetting& setting) {
   return setting.keyword == "BatchFileName" || setting.keyword == "TemplateFileName" ||
-         setting.keyword == "Initial_Sample_File_Name" || setting.keyword == "Instruction_File" ||
+         setting.keyword == "Initial_Sample_File_Name" || setting.keyword == "Earlier_Result_File" ||
+         setting.keyword == "Instruction_File" || setting.keyword == "Instruction_Times" ||
          (setting.keyword == "File_Name" && setting.section.ends_with("/OBSERVATION_FILE"));
 }
 

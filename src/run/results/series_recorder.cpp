@@ -18,6 +18,8 @@ constexpr double kLeastSecondsBetween = 5.0;
 constexpr double kShareOfWriting = 0.01;
 /// For evaluations whose aggregate is not known yet: 48 megabytes.
 constexpr std::size_t kMostUnsettledSteps = 4'000'000;
+/// Of a row without the name of its measure: a time and three numbers.
+constexpr std::size_t kUsualRowBytes = 48;
 
 std::size_t stepCount(const std::vector<PeriodSeries>& series) {
   std::size_t count = 0;
@@ -232,36 +234,54 @@ void SeriesRecorder::write() {
   if (initial_) table.initial = initial_->evaluation;
   table.isOfInitialParameters = initialChoice_.hasSetupValues();
   if (best_) table.best = best_->evaluation;
-  for (std::size_t i = 0; i < run_.measures.size(); ++i) table.series.push_back(shownSeries(i));
+  // One series after another: all of them may take more memory than their text.
+  std::size_t rowCount = 0;
+  std::size_t bytes = 0;
+  for (std::size_t i = 0; i < run_.measures.size(); ++i) {
+    const std::size_t rows = secondsOf(i).size();
+    rowCount += rows;
+    bytes += rows * (run_.measures[i].size() + kUsualRowBytes);
+  }
+  std::string text = seriesTableHead(table, rowCount);
+  text.reserve(text.size() + bytes);
+  for (std::size_t i = 0; i < run_.measures.size(); ++i) appendSeriesRows(text, shownSeries(i));
   std::string reason;
-  if (!replaceFile(path_, seriesTableText(table), reason)) warn(reason);
+  if (!replaceFile(path_, text, reason)) warn(reason);
   isChanged_ = false;
   const double ended = clock_();
   nextWrite_ = ended + std::max(kLeastSecondsBetween, (ended - begun) / kShareOfWriting);
 }
 
-/// The series of the pair at all their times in the period.
-ShownSeries SeriesRecorder::shownSeries(std::size_t pair) const {
+const PeriodSeries& SeriesRecorder::seriesOf(const std::optional<Held>& held, std::size_t pair) {
   static const PeriodSeries kNone;
-  const PeriodSeries& observed = run_.observations[pair];
-  const PeriodSeries& initial = initial_ ? initial_->series[pair] : kNone;
-  const PeriodSeries& best = best_ && !best_->series.empty() ? best_->series[pair] : kNone;
-  ShownSeries shown;
-  shown.measure = run_.measures[pair];
-  for (const PeriodSeries* series : {&observed, &initial, &best}) {
+  return held && !held->series.empty() ? held->series[pair] : kNone;
+}
+
+std::vector<std::int64_t> SeriesRecorder::secondsOf(std::size_t pair) const {
+  std::vector<std::int64_t> seconds;
+  for (const PeriodSeries* series : {&run_.observations[pair], &seriesOf(initial_, pair), &seriesOf(best_, pair)}) {
     for (const std::int64_t second : series->seconds) {
-      if (second >= run_.periodFirst && second <= run_.periodLast) shown.seconds.push_back(second);
+      if (second >= run_.periodFirst && second <= run_.periodLast) seconds.push_back(second);
     }
   }
-  std::sort(shown.seconds.begin(), shown.seconds.end());
-  shown.seconds.erase(std::unique(shown.seconds.begin(), shown.seconds.end()), shown.seconds.end());
+  std::sort(seconds.begin(), seconds.end());
+  seconds.erase(std::unique(seconds.begin(), seconds.end()), seconds.end());
+  return seconds;
+}
+
+/// The series of the pair at all their times in the period.
+ShownSeries SeriesRecorder::shownSeries(std::size_t pair) const {
+  const PeriodSeries& observed = run_.observations[pair];
+  ShownSeries shown;
+  shown.measure = run_.measures[pair];
+  shown.seconds = secondsOf(pair);
   shown.observed.assign(shown.seconds.size(), std::nanf(""));
   for (std::size_t i = 0, k = 0; k < observed.seconds.size(); ++k) {  // observations are not interpolated
     while (i < shown.seconds.size() && shown.seconds[i] < observed.seconds[k]) ++i;
     if (i < shown.seconds.size() && shown.seconds[i] == observed.seconds[k]) shown.observed[i] = observed.values[k];
   }
-  shown.initial = valuesAt(initial, shown.seconds, run_.largestGap);
-  shown.best = valuesAt(best, shown.seconds, run_.largestGap);
+  shown.initial = valuesAt(seriesOf(initial_, pair), shown.seconds, run_.largestGap);
+  shown.best = valuesAt(seriesOf(best_, pair), shown.seconds, run_.largestGap);
   return shown;
 }
 

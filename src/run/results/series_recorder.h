@@ -86,7 +86,10 @@ class SeriesRecorder final {
   void warnOfMissing();
   void write();
   void warn(std::string_view reason);
+  /// The times of the pair in the period at which it has any value.
+  std::vector<std::int64_t> secondsOf(std::size_t pair) const;
   ShownSeries shownSeries(std::size_t pair) const;
+  static const PeriodSeries& seriesOf(const std::optional<Held>& held, std::size_t pair);
 
   std::string path_;
   RecordedSeries run_;

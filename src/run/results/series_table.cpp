@@ -174,7 +174,7 @@ std::vector<std::string> seriesNames(std::span<const OutputMeasure> measures, st
   return names;
 }
 
-std::string seriesTableText(const SeriesTable& table) {
+std::string seriesTableHead(const SeriesTable& table, std::size_t rowCount) {
   std::string text;
   for (const std::string& line : table.headLines) text += fmt::format("# {}\n", withValidUtf8(line));
   if (table.initial) {
@@ -194,18 +194,24 @@ std::string seriesTableText(const SeriesTable& table) {
     add(key::kBest, std::to_string(table.best->number));
     add(key::kBestAggregate, formatReal(table.best->aggregate));
   }
-  add(key::kRows, std::to_string(table.rowCount()));
-  text.append(kHeader).append("\n");
-  for (const ShownSeries& series : table.series) {
-    for (std::size_t i = 0; i < series.seconds.size(); ++i) {
-      text += series.measure;
-      text += '\t' + isoTime(series.seconds[i]);
-      appendCell(text, series.observed[i]);
-      appendCell(text, series.initial[i]);
-      appendCell(text, series.best[i]);
-      text += '\n';
-    }
+  add(key::kRows, std::to_string(rowCount));
+  return text.append(kHeader).append("\n");
+}
+
+void appendSeriesRows(std::string& text, const ShownSeries& series) {
+  for (std::size_t i = 0; i < series.seconds.size(); ++i) {
+    text += series.measure;
+    text += '\t' + isoTime(series.seconds[i]);
+    appendCell(text, series.observed[i]);
+    appendCell(text, series.initial[i]);
+    appendCell(text, series.best[i]);
+    text += '\n';
   }
+}
+
+std::string seriesTableText(const SeriesTable& table) {
+  std::string text = seriesTableHead(table, table.rowCount());
+  for (const ShownSeries& series : table.series) appendSeriesRows(text, series);
   return text;
 }
 

@@ -60,6 +60,10 @@ std::vector<std::string> seriesNames(std::span<const OutputMeasure> measures, st
 
 /// The table as text: `#` head lines, a header row, tab-separated rows. Numbers read back as the same 32 bits.
 std::string seriesTableText(const SeriesTable& table);
+/// Its beginning, down to the header row, of a table of so many rows whose series need not be there; and the rows of
+/// one series.
+std::string seriesTableHead(const SeriesTable& table, std::size_t rowCount);
+void appendSeriesRows(std::string& text, const ShownSeries& series);
 
 /// Reads the text of a table. Accepts any text: lines that are not rows are left out, and a text without a header row
 /// has no series.

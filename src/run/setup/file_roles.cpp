@@ -85,6 +85,9 @@ void checkParameterFiles(const RunConfig& config, const SectionsRead& sections) 
       if (measure.interfaceType == InterfaceType::measureFile && config.measureFile == file) {
         refuse("the output-measure file", sections.measureFile->location("File_Name") + ": File_Name");
       }
+      if (measure.interfaceType == InterfaceType::measureFile && measure.measureFile == file) {
+        refuse("an output-measure file", "one of FURTHER_FILES");
+      }
       if (measure.interfaceType != InterfaceType::timeSeries || measure.simulation.fileName != file) continue;
       refuse("the file of a simulated series",
              measure.simulation.fileLocation.substr(0, measure.simulation.fileLocation.rfind(": ")));

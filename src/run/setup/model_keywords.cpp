@@ -12,19 +12,66 @@
 
 #include "algorithms/searches/search_methods.h"
 #include "measures/statistics.h"
+#include "measures/text_form_keywords.h"
 #include "run/setup/validation.h"
 
 namespace mirevo {
 namespace {
 
+constexpr std::string_view kItemNameMeaning =
+    "Its name in the file, in upper or lower case, with or without a unit in brackets behind it, in place of the "
+    "number "
+    "or beside it: they must then agree.";
+
 /// The keywords of the series that `seriesOf(measure)` returns.
 template <class SeriesOf>
 std::vector<KeywordRow> seriesKeywords(SeriesOf, std::string_view fileMeaning) {
   using Measure = OutputMeasure;
-  return {setting<Measure>([](auto& m) -> auto& { return SeriesOf{}(m).fileName; },
-                           {.name = "File_Name", .type = KeywordType::fileName, .meaning = std::string(fileMeaning)}),
-          setting<Measure>([](auto& m) -> auto& { return SeriesOf{}(m).itemNo; },
-                           {.name = "Item_No", .defaultValue = "1", .meaning = "Which item of the file, from 1."})};
+  std::vector<KeywordRow> rows = {
+      setting<Measure>([](auto& m) -> auto& { return SeriesOf{}(m).fileName; },
+                       {.name = "File_Name", .type = KeywordType::fileName, .meaning = std::string(fileMeaning)}),
+      setting<Measure>([](auto& m) -> auto& { return SeriesOf{}(m).itemNo; },
+                       {.name = "Item_No", .defaultValue = "1", .meaning = "Which item of the file, from 1."}),
+      setting<Measure>([](auto& m) -> auto& { return SeriesOf{}(m).itemName; },
+                       {.name = "Item_Name", .defaultValue = kNoDefault, .meaning = std::string(kItemNameMeaning)})};
+  std::vector<KeywordRow> ofForm = textFormRows<Measure>([](auto& m) -> auto& { return SeriesOf{}(m).form; });
+  std::move(ofForm.begin(), ofForm.end(), std::back_inserter(rows));
+  return rows;
+}
+
+/// Where in a listing the simulated series is.
+std::vector<KeywordRow> listingKeywords() {
+  using Measure = OutputMeasure;
+  return {setting<Measure>([](auto& m) -> auto& { return m.simulation.listingSettings.instructionFile; },
+                           {.name = kInstructionFileKeyword,
+                            .type = KeywordType::fileName,
+                            .defaultValue = kNoDefault,
+                            .meaning = "A file (`pif`) that says where in `File_Name`, which is then a listing of any "
+                                       "form, the numbers of series are. It needs one of the three ways below to tell "
+                                       "their times."}),
+          setting<Measure>([](auto& m) -> auto& { return m.simulation.listingSettings.timesFile; },
+                           {.name = kInstructionTimesKeyword,
+                            .type = KeywordType::fileName,
+                            .defaultValue = kNoDefault,
+                            .meaning = "A CSV table with the columns `name` and `time`, a row for each name in the "
+                                       "instruction file; a column `series` may name the series of each."}),
+          setting<Measure>([](auto& m) -> auto& { return m.simulation.listingSettings.dates; },
+                           {.name = kInstructionDatesKeyword,
+                            .defaultValue = kNoDefault,
+                            .meaning = "The form of the dates in which the names end, of `YYYY`, `MM`, `DD`, `hh`, "
+                                       "`mm` and `ss`: `'YYYYMMDD'` for `flow_19900101`."}),
+          setting<Measure>([](auto& m) -> auto& { return m.simulation.listingSettings.start; },
+                           {.name = kInstructionStartKeyword,
+                            .defaultValue = kNoDefault,
+                            .meaning = "Time of the first number of each series, where the names end in the number of "
+                                       "the step: `h1_1`, `h1_2`."}),
+          setting<Measure>([](auto& m) -> auto& { return m.simulation.listingSettings.stepHours; },
+                           {.name = kInstructionStepKeyword,
+                            .defaultValue = kNoDefault,
+                            .range = {.lowest = 0, .highest = 1e6, .lowestExcluded = true},
+                            .refusal = "Error: Step of the numbers in a listing invalid for output measure ",
+                            .unit = "h",
+                            .meaning = "From one number of a series to the next."})};
 }
 
 /// Which other item of the observation file is meant: `itemOf(weighting)`.
@@ -36,6 +83,15 @@ KeywordRow weightingItem(ItemOf, std::string_view keyword, std::string_view mean
                                  .range = from(1),
                                  .refusal = "Error: Item number invalid for output measure ",
                                  .meaning = std::string(meaning)});
+}
+
+/// The same by its name.
+template <class NameOf>
+KeywordRow weightingItemName(NameOf, std::string_view keyword, std::string_view number) {
+  return setting<OutputMeasure>([](auto& m) -> auto& { return NameOf{}(m.weighting); },
+                                {.name = keyword,
+                                 .defaultValue = kNoDefault,
+                                 .meaning = fmt::format("Its name, in place of `{}` or beside it.", number)});
 }
 
 /// The enumerator of a code that has a name only.
@@ -142,6 +198,12 @@ const SectionRow& listSection(std::string_view path) {
                              "Periods in which the measures that compare series are computed as well, for every "
                              "evaluation, without bearing on the objective functions or the search.",
                              {itemCount(0)}});
+    constexpr std::string_view kFurther = "ObjectiveFunctions/OUTPUT_MEASURES/FURTHER_FILES";
+    lists.emplace(kFurther, SectionRow{kFurther,
+                                       "if the setup has it",
+                                       "Output-measure files behind the one of `OUTPUT_MEASURE_FILE`, which then has "
+                                       "an `Instruction_File`, too.",
+                                       {itemCount(0)}});
     return lists;
   }();
   return rows.at(path);
@@ -383,6 +445,11 @@ const SettingSection<OutputMeasure>& measureSection() {
                                             .defaultValue = "''",
                                             .meaning = "The name of the number in the instruction file of the "
                                                        "output-measure file, in place of its number."}),
+        setting<&Measure::observedValue>(
+            {.name = "Observed_Value",
+             .defaultValue = "none",
+             .meaning = "With interface type 1: the measure is the difference of the model's number to this, times "
+                        "`Weight` or, if it is above 0, `Weight_Above`. Without it, the number itself."}),
         choice<Measure>(
             [](Measure& measure, const SetupValue& value) {
               const auto* code = std::get_if<std::int32_t>(&value);
@@ -440,11 +507,13 @@ const SettingSection<OutputMeasure>& measureSection() {
 
 const SettingSection<OutputMeasure>& simulationFileSection() {
   static const SettingSection<OutputMeasure> section{
-      {"ObjectiveFunctions/OUTPUT_MEASURES/MEASURE_n/SIMULATION_FILE", "for each measure of interface type 0",
-       "The simulated series.",
-       seriesKeywords(
-           [](auto& m) -> auto& { return m.simulation; },
-           "The simulated time-series file, in or below the base folder.")}};
+      withRows({"ObjectiveFunctions/OUTPUT_MEASURES/MEASURE_n/SIMULATION_FILE", "for each measure of interface type 0",
+                "The simulated series.",
+                seriesKeywords(
+                    [](auto& m) -> auto& { return m.simulation; },
+                    "The simulated time-series file, in or below the base folder."),
+                itemName<OutputMeasure>([](const OutputMeasure& measure) { return measure.name; })},
+               listingKeywords())};
   return section;
 }
 
@@ -457,13 +526,19 @@ const SettingSection<OutputMeasure>& observationFileSection() {
         [](auto& w) -> auto& { return w.weightItem; }, "Weight_Item_No",
         "Item of the file with a weight for each observation, which multiplies its "
         "difference. One with the weight 0 or a missing one does not count."));
+    keywords.push_back(weightingItemName(
+        [](auto& w) -> auto& { return w.weightName; }, "Weight_Item_Name", "Weight_Item_No"));
     keywords.push_back(weightingItem(
         [](auto& w) -> auto& { return w.errorItem; }, "Error_Item_No",
         "Item with a standard error for each observation: its weight is 1 over that. Not "
         "with `Weight_Item_No`."));
+    keywords.push_back(weightingItemName(
+        [](auto& w) -> auto& { return w.errorName; }, "Error_Item_Name", "Error_Item_No"));
     keywords.push_back(weightingItem(
         [](auto& w) -> auto& { return w.qualityItem; }, "Quality_Item_No",
         "Item with a quality code, a number, for each observation; those without one count in full."));
+    keywords.push_back(weightingItemName(
+        [](auto& w) -> auto& { return w.qualityName; }, "Quality_Item_Name", "Quality_Item_No"));
     keywords.push_back(setting<Measure>([](auto& m) -> auto& { return m.weighting.leftOut; },
                                         {.name = "Quality_Left_Out",
                                          .defaultValue = kNoDefault,
@@ -491,7 +566,7 @@ const SettingSection<OutputMeasure>& observationFileSection() {
 }
 
 const SettingSection<SeriesReference>& shownAboveSection() {
-  static const SettingSection<SeriesReference> section{
+  static const SettingSection<SeriesReference> section{withRows(
       {"ObjectiveFunctions/OUTPUT_MEASURES/MEASURE_n/SHOWN_ABOVE",
        "for each measure that has it",
        "A series, such as precipitation, that the report draws above the hydrograph, from the top down. It is not "
@@ -504,7 +579,13 @@ const SettingSection<SeriesReference>& shownAboveSection() {
         setting<&SeriesReference::itemNo>({.name = "Item_No",
                                            .defaultValue = "1",
                                            .meaning = "Which item of the file, from 1.",
-                                           .bearsOnResults = kNotOfResults})}}};
+                                           .bearsOnResults = kNotOfResults}),
+        setting<&SeriesReference::itemName>({.name = "Item_Name",
+                                             .defaultValue = kNoDefault,
+                                             .meaning = std::string(kItemNameMeaning),
+                                             .bearsOnResults = kNotOfResults})}},
+      textFormRows<SeriesReference>(
+          [](auto& s) -> auto& { return s.form; }, kNotOfResults))};
   return section;
 }
 
@@ -572,7 +653,7 @@ const SettingSection<RunConfig>& measureFileSection() {
   static const SettingSection<RunConfig> section{
       {"ObjectiveFunctions/OUTPUT_MEASURES/OUTPUT_MEASURE_FILE",
        "always",
-       "The file from which measures of interface type 1 take their numbers.",
+       "The file from which measures of interface type 1 take their numbers, and the first of several.",
        {setting<&RunConfig::measureFile>(
             {.name = "File_Name",
              .type = KeywordType::fileName,
@@ -584,7 +665,22 @@ const SettingSection<RunConfig>& measureFileSection() {
              .type = KeywordType::fileName,
              .defaultValue = "''",
              .meaning = "A file (`pif`) that says where in the output-measure file the numbers are. Without it, the "
-                        "file has numbers alone."})}}};
+                        "file has numbers alone. Read if a measure has interface type 1."})}}};
+  return section;
+}
+
+const SettingSection<MeasureFileSource>& furtherMeasureFileSection() {
+  static const SettingSection<MeasureFileSource> section{
+      {"ObjectiveFunctions/OUTPUT_MEASURES/FURTHER_FILES/FURTHER_FILE_n",
+       "for each item",
+       "A file that the model writes, or another reading of one. Its numbers are counted on behind those of the files "
+       "before it, and its names differ from theirs.",
+       {setting<&MeasureFileSource::fileName>(
+            {.name = "File_Name", .type = KeywordType::fileName, .meaning = "In or below the base folder."}),
+        setting<&MeasureFileSource::instructionFile>(
+            {.name = "Instruction_File",
+             .type = KeywordType::fileName,
+             .meaning = "A file (`pif`) that says where in the file the numbers are."})}}};
   return section;
 }
 

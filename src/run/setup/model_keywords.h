@@ -36,6 +36,7 @@ const SettingSection<SeriesReference>& shownAboveSection();
 const SettingSection<ObjectiveSection>& objectiveSection();
 const SettingSection<SavedOutputFile>& savedFileSection();
 const SettingSection<RunConfig>& measureFileSection();
+const SettingSection<MeasureFileSource>& furtherMeasureFileSection();
 
 /// The section of a list, which has only its count. `path` is below the target.
 const SectionRow& listSection(std::string_view path);

@@ -43,6 +43,10 @@ int RunConfig::plannedEvaluations() const {
   return task ? task->plannedEvaluations() : 0;
 }
 
+int RunConfig::mostAtOnce() const {
+  return std::max(1, task ? task->mostAtOnce() : 0);
+}
+
 int RunConfig::plannedModelRuns() const {
   const int planned = plannedEvaluations();
   const bool hasFinalRun = task && task->hasFinalRun();

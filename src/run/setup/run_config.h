@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "measures/instruction_file.h"
+#include "measures/measure_file.h"
 #include "measures/objective_functions.h"
 #include "measures/output_measure.h"
 #include "measures/validation_period.h"
@@ -36,9 +37,11 @@ struct RunConfig {
 
   std::unique_ptr<Task> task;  ///< nullptr if the simulation option names none: nothing is run
   std::string title;
-  bool writesReport = true;  ///< a report at the end of the run
+  bool writesReport = true;              ///< a report at the end of the run
+  std::string improvementCommand;        ///< run by the shell when the best set improves and at the end; empty: none
+  double improvementCommandTime = 60.0;  ///< longest time of it, s
   std::vector<BatchItem> batchItems;
-  std::string baseFolder;  ///< the folder of the first batch file
+  std::string baseFolder;  ///< of which model runs get a copy; of the first batch file, unless the setup names one
   std::vector<ParameterFileItem> parameterFiles;
   std::vector<ModelParameter> parameters;
   std::vector<InternalConstraint> constraints;
@@ -50,6 +53,7 @@ struct RunConfig {
   std::string measureFile;                              ///< may be given though no measure reads it
   std::string instructionFile;                          ///< where its numbers are; empty: in free format
   std::shared_ptr<const InstructionFile> instructions;  ///< its content
+  std::vector<MeasureFileSource> furtherMeasureFiles;   ///< behind the first one
   std::vector<ObjectiveFunction> objectives;
   std::vector<SavedOutputFile> savedOutputFiles;
 
@@ -70,6 +74,8 @@ struct RunConfig {
   int plannedEvaluations() const;
   /// plannedEvaluations() and the final model run of a search, for the progress.
   int plannedModelRuns() const;
+  /// Most model runs at a time that the task has use for, at least 1.
+  int mostAtOnce() const;
   /// Whether the task's results depend on the random seed.
   bool drawsRandomNumbers() const { return task && task->drawsRandomNumbers(); }
   /// Whether the task uses simulated values at the observation times.

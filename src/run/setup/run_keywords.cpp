@@ -41,6 +41,13 @@ const SettingSection<RunConfig>& simulationOptionSection() {
                                     .defaultValue = "''",
                                     .meaning = "Title of the run, in the log and the result files.",
                                     .bearsOnResults = kNotOfResults}),
+        setting<&RunConfig::baseFolder>(
+            {.name = "Base_Folder",
+             .type = KeywordType::fileName,
+             .defaultValue = "''",
+             .meaning = "Folder with all files of the model, which each model run gets a copy of: for batch files in "
+                        "folders beside one another. Blank: the folder of the first batch file.",
+             .bearsOnResults = kNotOfResults}),
         setting<&RunConfig::restart>(
             {.name = "Restart",
              .defaultValue = "0",
@@ -75,6 +82,21 @@ const SettingSection<RunConfig>& simulationOptionSection() {
              .defaultValue = "1",
              .meaning = "1: a report for the browser is written at the end of the run, as `<setup>_Report.html`. 0: "
                         "none, and no series are kept for one.",
+             .bearsOnResults = kNotOfResults}),
+        setting<&RunConfig::improvementCommand>(
+            {.name = "Improvement_Command",
+             .defaultValue = "''",
+             .meaning =
+                 "A command that `/bin/sh` runs in the setup's folder, beside the run, whenever an evaluation is "
+                 "the best so far, and at the end of the run, with the values in its environment. Blank: none.",
+             .bearsOnResults = kNotOfResults}),
+        setting<&RunConfig::improvementCommandTime>(
+            {.name = "Improvement_Command_Time",
+             .defaultValue = "60.0",
+             .range = kPositive,
+             .refusal = "Error: Invalid time of the improvement command",
+             .unit = "s",
+             .meaning = "Longest time of each run of `Improvement_Command`; one that takes longer is ended.",
              .bearsOnResults = kNotOfResults})}}};
   return section;
 }
@@ -164,7 +186,9 @@ const SetupSchema& setupSchema() {
       const auto sections = task->sections();
       rows.insert(rows.end(), sections.begin(), sections.end());
     }
-    rows.insert(rows.end(), {&slotsSection().row, &measureFileSection().row, &reservedSection()});
+    rows.insert(rows.end(), {&slotsSection().row, &measureFileSection().row,
+                             &listSection("ObjectiveFunctions/OUTPUT_MEASURES/FURTHER_FILES"),
+                             &furtherMeasureFileSection().row, &reservedSection()});
     return SetupSchema(std::move(rows));
   }();
   return schema;

@@ -2,6 +2,8 @@
 
 #include <algorithm>
 #include <array>
+#include <cerrno>
+#include <cstring>
 #include <filesystem>
 #include <optional>
 #include <unordered_map>
@@ -12,6 +14,8 @@
 #include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/text.h"
+#include "measures/listing_series.h"
+#include "measures/text_form_keywords.h"
 #include "parameters/read_template.h"
 #include "platform/processes/argument_text.h"
 #include "run/access/file_validation.h"
@@ -77,7 +81,8 @@ class SetupReader final {
     if (config_.task) {
       config_.task->read({target_, config_.parameters, sections_.parameters, config_.constraints,
                           config_.variableParameterCount(),
-                          [this](bool hasInitialSample) { requireScales(hasInitialSample); }, config_.period});
+                          [this](bool hasInitialSample) { requireScales(hasInitialSample); }, config_.period,
+                          config_.setupFolder + "/" + config_.setupName});
       for (std::size_t i = 0; i < config_.parameters.size(); ++i) {
         config_.parameters[i].givenValues = config_.task->givenValues(i);
       }
@@ -92,6 +97,7 @@ class SetupReader final {
 
  private:
   void readSimulationOption();
+  void checkBaseFolder(const SetupSection& section);
   void checkBatchItem(const SetupSection& section, const BatchItem& item);
   void refuseNameOfSetup(const std::string& path, std::string_view keyword, const SetupSection& section) const;
   void checkParameterFile(const SetupSection& section, const ParameterFileItem& item) const;
@@ -101,25 +107,41 @@ class SetupReader final {
   void readObjectiveFunctions();
   void readValidationPeriods(const SetupSection& parent);
   static void locateReference(const SetupSection& section, SeriesReference& reference);
-  void readSeries(const SetupSection& section, OutputMeasure& measure) const;
+  void readSeries(const SetupSection& section, OutputMeasure& measure);
+  void readListing(const SetupSection& section, SeriesReference& simulation);
   void connectMeasures();
   void readSavedFiles();
   void readSimultaneousSimulations();
   void readMeasureFile();
   void readInstructions(const SetupSection& section);
+  static std::shared_ptr<const InstructionFile> openInstructions(const SetupSection& section, const std::string& file);
+  void readFurtherMeasureFiles(const SetupSection& section);
+  void gatherMeasurements(const SetupSection& section);
   void findMeasurement(const SetupSection& section, OutputMeasure& measure) const;
   void requireScales(bool hasInitialSample) const;
 
+  /// The numbers that instructions read.
+  struct Measurements {
+    std::vector<std::string> names;
+    std::unordered_map<std::string, std::size_t> places;  ///< by name in lower case
+    std::vector<std::size_t> ends;                        ///< of the files, in `names`
+    std::string files;                                    ///< of instructions, for messages
+  };
+
   SetupFile& file_;
   SetupSection target_;
+  Measurements measurements_;
   RunConfig config_;
   SectionsRead sections_;
   std::optional<EquationCheck> equations_;  ///< over the parameters, once they are read
+  using Listing = std::pair<ListingSettings, std::shared_ptr<const ListingForm>>;
+  std::vector<Listing> listings_;  ///< that were read
 };
 
 void SetupReader::readSimulationOption() {
   const SetupSection section = target_.open("MIREVO_SIMULATION_OPTION");
   section.read(simulationOptionSection(), config_);
+  checkBaseFolder(section);
   file_.need(seriesSections(target_));
   if (config_.task) {
     file_.need(config_.task->neededSections(target_));
@@ -141,6 +163,16 @@ void SetupReader::readSimulationOption() {
                  });
 }
 
+/// As the setup has it; most have none.
+void SetupReader::checkBaseFolder(const SetupSection& section) {
+  std::string& folder = config_.baseFolder;
+  if (folder.empty()) return;
+  while (folder.size() > 1 && folder.back() == '/') folder.pop_back();
+  std::error_code failed;
+  if (std::filesystem::is_directory(folder, failed)) return;
+  section.refuse("Error: Invalid base folder", "Base_Folder", fmt::format("there is no folder {}", folder));
+}
+
 void SetupReader::checkBatchItem(const SetupSection& section, const BatchItem& item) {
   constexpr std::string_view kKeyword = "BatchFileName";
   const std::string& path = item.batchFileName;
@@ -148,7 +180,9 @@ void SetupReader::checkBatchItem(const SetupSection& section, const BatchItem& i
     section.refuse("Error: No model simulation sequence defined", kKeyword, "expected the name of a file");
   }
   const bool isFirst = &item == &config_.batchItems.front();
-  if (isFirst) config_.baseFolder = std::filesystem::path(path).parent_path().string();
+  if (isFirst && config_.baseFolder.empty()) {
+    config_.baseFolder = std::filesystem::path(path).parent_path().string();
+  }
   validateInBaseFolder(path, config_.baseFolder, kKeyword, section);
   validateFileExists(path, kKeyword, section);
   refuseNameOfSetup(path, kKeyword, section);
@@ -286,11 +320,22 @@ void SetupReader::readValidationPeriods(const SetupSection& parent) {
 /// location.
 void SetupReader::locateReference(const SetupSection& section, SeriesReference& reference) {
   reference.fileLocation = section.location("File_Name") + ": File_Name: ";
-  reference.itemLocation = section.location("Item_No") + ": Item_No: ";
-  reference.isDefaultItem = !section.isWritten("Item_No");
+  reference.itemName = trim(reference.itemName);
+  const std::string_view itemKeyword = reference.itemName.empty() ? "Item_No" : "Item_Name";
+  reference.itemLocation = fmt::format("{}: {}: ", section.location(itemKeyword), itemKeyword);
+  reference.hasItemNo = section.isWritten("Item_No");
+  reference.isDefaultItem = !reference.hasItemNo && reference.itemName.empty();
+  for (const KeywordRow& row : textFormRows<TextForm>([](auto& form) -> auto& { return form; })) {
+    if (!section.isWritten(row.name()) || reference.form.isGiven) continue;
+    reference.form.isGiven = true;
+    reference.formLocation = fmt::format("{}: {}: ", section.location(row.name()), row.name());
+  }
+  if (const auto fault = findFault(reference.form)) {
+    section.refuse("Error: Form of a text file invalid", fault->keyword, fault->explanation);
+  }
 }
 
-void SetupReader::readSeries(const SetupSection& section, OutputMeasure& measure) const {
+void SetupReader::readSeries(const SetupSection& section, OutputMeasure& measure) {
   const std::int64_t number = std::ssize(config_.measures);
   // A measure that the model writes itself needs no series; its sections are read if present.
   const bool needsSeries = measure.interfaceType == InterfaceType::timeSeries;
@@ -307,16 +352,19 @@ void SetupReader::readSeries(const SetupSection& section, OutputMeasure& measure
     if (!measure.simulation.fileName.empty()) {
       validateInBaseFolder(measure.simulation.fileName, config_.baseFolder, "File_Name", *simulated);
     }
+    if (needsSeries) readListing(*simulated, measure.simulation);
   }
   if (const auto observed = open("OBSERVATION_FILE")) {
     observed->read(observationFileSection(), measure);
     locateReference(*observed, measure.observation);
-    const auto locationOf = [&observed](std::string_view keyword) {
+    const auto locationOf = [&observed](std::string_view item, const std::string& name) {
+      const std::string keyword = fmt::format("{}{}", item, name.empty() ? "_No" : "_Name");
       return fmt::format("{}: {}: ", observed->location(keyword), keyword);
     };
-    measure.weighting.weightLocation =
-        locationOf(measure.weighting.errorItem != 0 ? "Error_Item_No" : "Weight_Item_No");
-    measure.weighting.qualityLocation = locationOf("Quality_Item_No");
+    const ObservationWeighting& weighting = measure.weighting;
+    measure.weighting.weightLocation = weighting.hasErrors() ? locationOf("Error_Item", weighting.errorName)
+                                                             : locationOf("Weight_Item", weighting.weightName);
+    measure.weighting.qualityLocation = locationOf("Quality_Item", weighting.qualityName);
     if (observed->isWritten("Quality_Weight") && measure.weighting.downWeighted.empty()) {
       observed->warn("Quality_Weight", "has no effect without Quality_Down_Weighted");
     }
@@ -329,6 +377,38 @@ void SetupReader::readSeries(const SetupSection& section, OutputMeasure& measure
     above->read(shownAboveSection(), measure.shownAbove);
     locateReference(*above, measure.shownAbove);
   }
+}
+
+/// What of a listing is a series. Files are read once for all measures with the same settings.
+void SetupReader::readListing(const SetupSection& section, SeriesReference& simulation) {
+  const ListingSettings& settings = simulation.listingSettings;
+  if (settings.instructionFile.empty()) {
+    for (const std::string_view keyword :
+         {kInstructionTimesKeyword, kInstructionDatesKeyword, kInstructionStartKeyword, kInstructionStepKeyword}) {
+      if (section.isWritten(keyword)) {
+        section.warn(keyword, fmt::format("has no effect without {}", kInstructionFileKeyword));
+      }
+    }
+    return;
+  }
+  if (simulation.form.isGiven) {
+    section.refuse("Error: Form of a text file invalid", kInstructionFileKeyword,
+                   "the file is either a text table or a listing that instructions read: leave out this keyword, or "
+                   "those that tell the form of a table");
+  }
+  const auto known = std::ranges::find(listings_, settings, &Listing::first);
+  if (known != listings_.end()) {
+    simulation.listing = known->second;
+    return;
+  }
+  ListingFault fault;
+  simulation.listing = ListingForm::read(settings, fault);
+  if (!simulation.listing) {
+    section.refuse(fault.keyword == kInstructionFileKeyword ? "Error: Invalid instruction file"
+                                                            : "Error: Invalid times of the numbers in a listing",
+                   fault.keyword, fault.text);
+  }
+  listings_.emplace_back(settings, simulation.listing);
 }
 
 /// Adds to each objective function the measures that name it.
@@ -389,7 +469,7 @@ void SetupReader::readSimultaneousSimulations() {
     return;
   }
   // A slot has its own copy of the model; unused slots would only fill the disk.
-  const int mostUsed = std::max(1, config_.task ? config_.task->mostAtOnce() : 0);
+  const int mostUsed = config_.mostAtOnce();
   if (config_.simultaneousSimulations <= mostUsed) return;
   section.warn(kSlotsKeyword, fmt::format("only {} can be used by the evaluations of this run", mostUsed));
   config_.simultaneousSimulations = mostUsed;
@@ -408,19 +488,65 @@ void SetupReader::readMeasureFile() {
   readInstructions(section);
 }
 
-/// Where the numbers of the output-measure file are, and the numbers of the measures that name them.
-void SetupReader::readInstructions(const SetupSection& section) {
-  if (!config_.instructionFile.empty()) {
-    std::string reason;
-    const auto text = readTextFile(config_.instructionFile, reason);
-    if (!text) {
-      section.refuse("Error: Unable to open instruction file", "Instruction_File",
-                     fmt::format("{}: {}", config_.instructionFile, reason));
-    }
-    auto instructions = InstructionFile::parse(config_.instructionFile, *text, reason);
-    if (!instructions) section.refuse("Error: Invalid instruction file", "Instruction_File", reason);
-    config_.instructions = std::make_shared<const InstructionFile>(*std::move(instructions));
+std::shared_ptr<const InstructionFile> SetupReader::openInstructions(const SetupSection& section,
+                                                                     const std::string& file) {
+  std::string reason;
+  const auto text = readTextFile(file, reason);
+  if (!text) {
+    section.refuse("Error: Unable to open instruction file", "Instruction_File", fmt::format("{}: {}", file, reason));
   }
+  auto instructions = InstructionFile::parse(file, *text, reason);
+  if (!instructions) section.refuse("Error: Invalid instruction file", "Instruction_File", reason);
+  return std::make_shared<const InstructionFile>(*std::move(instructions));
+}
+
+/// The output-measure files behind the one of `section`.
+void SetupReader::readFurtherMeasureFiles(const SetupSection& section) {
+  const auto list = target_.open("ObjectiveFunctions").open("OUTPUT_MEASURES").openIfPresent("FURTHER_FILES");
+  if (!list) return;
+  list->readItems("FURTHER_FILE_", furtherMeasureFileSection(), config_.furtherMeasureFiles,
+                  [this](const SetupSection& opened, MeasureFileSource& file) {
+                    if (file.fileName.empty()) {
+                      opened.refuse("Error: File containing output measures not defined", "File_Name",
+                                    "expected the name of a file");
+                    }
+                    validateInBaseFolder(file.fileName, config_.baseFolder, "File_Name", opened);
+                    file.instructions = openInstructions(opened, file.instructionFile);
+                  });
+  if (config_.furtherMeasureFiles.empty()) return;
+  if (!config_.instructions) {
+    section.refuse("Error: Instruction file of the output-measure file not defined", "Instruction_File",
+                   "expected the name of a file, since there are FURTHER_FILES, whose numbers are counted on from its");
+  }
+}
+
+/// Names of all output-measure files: each tells one number of them.
+void SetupReader::gatherMeasurements(const SetupSection& section) {
+  const auto gather = [&](const InstructionFile& instructions, const std::string& file) {
+    for (const std::string& name : instructions.names()) {
+      if (!measurements_.places.emplace(toLowerAscii(name), measurements_.names.size()).second) {
+        section.refuse("Error: Invalid instruction file", "Instruction_File",
+                       fmt::format("expected a name in {} that is not in {}, found {}", file, measurements_.files,
+                                   quotedForMessage(name)));
+      }
+      measurements_.names.push_back(name);
+    }
+    measurements_.ends.push_back(measurements_.names.size());
+    measurements_.files += (measurements_.files.empty() ? "" : ", ") + file;
+  };
+  if (config_.instructions) gather(*config_.instructions, config_.instructionFile);
+  for (const MeasureFileSource& file : config_.furtherMeasureFiles) gather(*file.instructions, file.instructionFile);
+}
+
+/// Where the numbers of the output-measure files are, and the numbers of the measures that name them.
+void SetupReader::readInstructions(const SetupSection& section) {
+  if (!config_.instructionFile.empty() && !config_.readsMeasureFile()) {
+    section.warn("Instruction_File", "not read, as no output measure has Interface_Type = 1");
+  } else if (!config_.instructionFile.empty()) {
+    config_.instructions = openInstructions(section, config_.instructionFile);
+  }
+  if (config_.readsMeasureFile()) readFurtherMeasureFiles(section);
+  gatherMeasurements(section);
   for (std::size_t i = 0; i < config_.measures.size(); ++i) {
     OutputMeasure& measure = config_.measures[i];
     if (measure.interfaceType == InterfaceType::measureFile) {
@@ -431,7 +557,7 @@ void SetupReader::readInstructions(const SetupSection& section) {
   }
 }
 
-/// Which number of the output-measure file a measure is.
+/// Which number of the output-measure files a measure is.
 void SetupReader::findMeasurement(const SetupSection& section, OutputMeasure& measure) const {
   const std::string message = "Error: Measurement No. invalid for output measure " + measure.name;
   const InstructionFile* const instructions = config_.instructions.get();
@@ -441,24 +567,31 @@ void SetupReader::findMeasurement(const SetupSection& section, OutputMeasure& me
     section.refuse(message, "Measurement_Name",
                    "expected MeasurementNo, or Instruction_File in OUTPUT_MEASURE_FILE, of which this would be a name");
   }
-  const std::vector<std::string>& names = instructions->names();
+  const std::vector<std::string>& names = measurements_.names;
+  const std::string& files = measurements_.files;
   if (name.empty()) {
-    if (static_cast<std::size_t>(measure.measurementNo) <= names.size()) return;
-    section.refuse(message, "MeasurementNo",
-                   fmt::format("expected 1 to {}, since so many numbers are read by {}, found {}", names.size(),
-                               config_.instructionFile, measure.measurementNo));
+    if (static_cast<std::size_t>(measure.measurementNo) > names.size()) {
+      section.refuse(message, "MeasurementNo",
+                     fmt::format("expected 1 to {}, since so many numbers are read by {}, found {}", names.size(),
+                                 files, measure.measurementNo));
+    }
+  } else {
+    if (section.isWritten("MeasurementNo")) {
+      section.refuse(message, "Measurement_Name", "expected this or MeasurementNo, found both");
+    }
+    const auto place = measurements_.places.find(toLowerAscii(name));
+    if (place == measurements_.places.end()) {
+      const auto nearest = nearestName(name, names);
+      section.refuse(message, "Measurement_Name",
+                     fmt::format("expected a name in {}, found {}{}", files, quotedForMessage(name),
+                                 nearest ? fmt::format(", did you mean {}?", *nearest) : ""));
+    }
+    measure.measurementNo = static_cast<std::int32_t>(place->second) + 1;
   }
-  if (section.isWritten("MeasurementNo")) {
-    section.refuse(message, "Measurement_Name", "expected this or MeasurementNo, found both");
-  }
-  const auto place = instructions->placeOf(name);
-  if (!place) {
-    const auto nearest = nearestName(name, names);
-    section.refuse(message, "Measurement_Name",
-                   fmt::format("expected a name in {}, found {}{}", config_.instructionFile, quotedForMessage(name),
-                               nearest ? fmt::format(", did you mean {}?", *nearest) : ""));
-  }
-  measure.measurementNo = static_cast<std::int32_t>(*place) + 1;
+  const auto number = static_cast<std::size_t>(measure.measurementNo);
+  const auto file = static_cast<std::size_t>(
+      std::lower_bound(measurements_.ends.begin(), measurements_.ends.end(), number) - measurements_.ends.begin());
+  if (file > 0) measure.measureFile = config_.furtherMeasureFiles[file - 1].fileName;
 }
 
 }  // namespace
@@ -477,6 +610,22 @@ RunConfig readSetup(const std::string& fileName, std::string_view text, RunLog& 
 
 RunConfig readSetupFile(const std::string& fileName, RunLog& log) {
   return readSetup(fileName, readSetupText(fileName), log);
+}
+
+void requireSetupFile(const SetupLocation& setup) {
+  const std::string unopened = "Error: Unable to open " + setup.file;
+  if (const std::string fault = faultOfFile(setup.folder); fault == std::strerror(ENOENT)) {
+    fatalError(unopened, fmt::format("there is no folder {}", setup.folder));
+  } else if (fault.empty()) {
+    fatalError(unopened, fmt::format("{} is a file and no folder", setup.folder));
+  }
+  const std::string fault = faultOfFile(setup.file);
+  if (fault.empty()) return;
+  std::error_code ignored;
+  if (std::filesystem::exists(setup.file, ignored)) fatalError(unopened, fault);  // it may be in /dev
+  // The run's files would be those of that setup, of which a run may be going on.
+  const std::string meant = setup.file + ".kdx";
+  if (faultOfFile(meant).empty()) fatalError(unopened, fmt::format("{}; did you mean {}?", fault, meant));
 }
 
 std::string readSetupText(const std::string& fileName) {

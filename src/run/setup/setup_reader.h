@@ -18,6 +18,10 @@ RunConfig readSetupFile(const std::string& fileName, RunLog& log);
 /// is that of the workers, whatever the setup says.
 RunConfig readSetup(const std::string& fileName, std::string_view text, RunLog& log, bool usesMpiWorkers = false);
 
+/// Throws FatalError, before anything is made beside it, where the setup file cannot be one: its folder is none, it is
+/// a folder or device, or ".kdx" was left out. A file that is just not there passes.
+void requireSetupFile(const SetupLocation& setup);
+
 /// The text of a setup file. Throws FatalError when it cannot be read.
 std::string readSetupText(const std::string& fileName);
 

@@ -67,8 +67,8 @@ class Summary final {
     line("Objective functions: {}", config_.objectives.size());
     for (const ObjectiveFunction& function : config_.objectives) {
       std::string text =
-          fmt::format("  {}: {} of {} output measures, weight {}", function.name,
-                      codeName(kFunctionTypeNames, function.functionType), function.measures.size(), function.weight);
+          fmt::format("  {}: {} of {}, weight {}", function.name, codeName(kFunctionTypeNames, function.functionType),
+                      countText(function.measures.size(), "output measure"), function.weight);
       if (function.standardDeviation) text += fmt::format(", standard deviation {}", *function.standardDeviation);
       if (function.location) text += fmt::format(", location {}", *function.location);
       line("{}", text);
@@ -104,7 +104,11 @@ class Summary final {
 }  // namespace
 
 std::string statisticName(const OutputMeasure& measure) {
-  if (measure.interfaceType == InterfaceType::measureFile) return "written by the model";
+  if (measure.interfaceType == InterfaceType::measureFile) {
+    return measure.observedValue
+               ? fmt::format("weighted difference of the model's number to {}", formatReal(*measure.observedValue))
+               : "written by the model";
+  }
   return describeStatistic(measure);
 }
 

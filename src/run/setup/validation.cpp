@@ -177,23 +177,29 @@ std::optional<SettingRefusal> validateWeighting(const OutputMeasure& measure) {
     return SettingRefusal{"Error: Weights of observations invalid for output measure " + measure.name, keyword,
                           std::move(explanation)};
   };
-  if (w.weightItem != 0 && w.errorItem != 0) {
-    return refuse("Error_Item_No", "expected Weight_Item_No or Error_Item_No, found both");
+  if (w.hasWeights() && w.hasErrors()) {
+    return refuse(
+        w.errorItem != 0 ? "Error_Item_No" : "Error_Item_Name",
+        fmt::format("expected {} or {}, found both", w.weightItem != 0 ? "Weight_Item_No" : "Weight_Item_Name",
+                    w.errorItem != 0 ? "Error_Item_No" : "Error_Item_Name"));
   }
-  const std::string_view weightKeyword = w.errorItem != 0 ? "Error_Item_No" : "Weight_Item_No";
+  const std::string_view weightKeyword = w.errorItem != 0    ? "Error_Item_No"
+                                         : w.hasErrors()     ? "Error_Item_Name"
+                                         : w.weightItem != 0 ? "Weight_Item_No"
+                                                             : "Weight_Item_Name";
   const bool hasCodes = !w.leftOut.empty() || !w.downWeighted.empty();
   const std::string_view listKeyword = w.leftOut.empty() ? "Quality_Down_Weighted" : "Quality_Left_Out";
-  if (hasCodes && w.qualityItem == 0) {
+  if (hasCodes && !w.hasCodes()) {
     return refuse(listKeyword, "expected Quality_Item_No beside it, the item of the file that has the codes");
   }
-  if (!hasCodes && w.qualityItem != 0) {
-    return refuse("Quality_Item_No",
+  if (!hasCodes && w.hasCodes()) {
+    return refuse(w.qualityItem != 0 ? "Quality_Item_No" : "Quality_Item_Name",
                   "expected Quality_Left_Out or Quality_Down_Weighted beside it, the codes that "
                   "make a difference");
   }
   for (const auto& [keyword, item] : {std::pair{weightKeyword, std::max(w.weightItem, w.errorItem)},
                                       std::pair{std::string_view("Quality_Item_No"), w.qualityItem}}) {
-    if (item != measure.observation.itemNo) continue;
+    if (item != measure.observation.itemNo || !measure.observation.itemName.empty()) continue;
     return refuse(keyword, fmt::format("expected another item than the observed one, Item_No = {}", item));
   }
   const auto isInBoth = [&w](double code) { return std::ranges::find(w.leftOut, code) != w.leftOut.end(); };
@@ -209,7 +215,7 @@ std::optional<SettingRefusal> validateWeighting(const OutputMeasure& measure) {
   if (measure.interfaceType != InterfaceType::timeSeries || !w.weighs() || takesWeights(measure)) return std::nullopt;
   const bool isOfRanks = measure.transformation == ValueTransformation::rank;
   return refuse(
-      std::max(w.weightItem, w.errorItem) != 0 ? weightKeyword : "Quality_Down_Weighted",
+      w.hasWeights() || w.hasErrors() ? weightKeyword : "Quality_Down_Weighted",
       fmt::format("{} has no weighted form: use another one, or leave observations out with "
                   "Quality_Left_Out",
                   isOfRanks ? std::string("the transformation 'rank'")

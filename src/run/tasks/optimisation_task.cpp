@@ -2,6 +2,8 @@
 
 #include <algorithm>
 #include <cmath>
+#include <filesystem>
+#include <limits>
 #include <set>
 #include <span>
 #include <utility>
@@ -146,15 +148,15 @@ std::string waysToRunSeveral() {
   return text;
 }
 
-void warnOffGrid(const ModelParameter& parameter, std::span<const double> values, const SetupSection& section) {
+void warnOffGrid(const ModelParameter& parameter, std::span<const double> values, const SetupSection& section,
+                 std::string_view keyword) {
   const auto isOff = [&parameter](double value) { return !isOnGrid(parameter, value); };
   const auto first = std::find_if(values.begin(), values.end(), isOff);
   if (first == values.end()) return;
   const auto count = std::count_if(first, values.end(), isOff);
-  section.warn(kInitialSampleFileKeyword,
-               fmt::format("{} of the {} values of the integer parameter {} {} between its steps: {} {}", count,
-                           values.size(), quotedForMessage(parameter.name), count == 1 ? "is" : "are",
-                           formatReal(*first), offGridText(parameter, *first)));
+  section.warn(keyword, fmt::format("{} of the {} values of the integer parameter {} {} between its steps: {} {}",
+                                    count, values.size(), quotedForMessage(parameter.name), count == 1 ? "is" : "are",
+                                    formatReal(*first), offGridText(parameter, *first)));
 }
 
 }  // namespace
@@ -202,6 +204,7 @@ void OptimisationTask::read(const TaskReading& reading) {
     sample.warn(kInitialSampleFileKeyword, fmt::format("not read, as Initial_Sample_Generation is {} and not 4",
                                                        static_cast<int>(initialSample.generation)));
   }
+  readEarlierResults(reading, sample);
   reading.requireScales(method->evaluatesSample(initialSample));
 
   const SetupSection stops = section.open(nameInside(stoppingSection().row));
@@ -214,6 +217,11 @@ void OptimisationTask::warnOfUnusedSample(const SetupSection& section) const {
   constexpr std::string_view kKeyword = "Initial_Sample_Generation";
   const bool isWanted = initialSample.generation != SampleGeneration::uniformRandom && section.isWritten(kKeyword);
   if (method->facts().drawsInitialSample || !isWanted) return;
+  if (!initialSample.earlierFile.empty()) {
+    section.warn(kKeyword, fmt::format("{} has no effect: {} starts from given sets alone",
+                                       static_cast<int>(initialSample.generation), method->facts().longName));
+    return;
+  }
   section.warn(kKeyword, fmt::format("{} has no effect: {} {}", static_cast<int>(initialSample.generation),
                                      method->facts().longName,
                                      method->evaluatesSample(initialSample) ? "draws its start points uniformly"
@@ -232,23 +240,81 @@ void OptimisationTask::takeGivenValues(const TaskReading& reading, const SetupSe
   } catch (const FatalError&) {
     return;  // refused later: bounds with the other parameters, the file by requireSets()
   }
-  std::size_t variable = 0;
-  for (const ModelParameter& parameter : reading.parameters) {
-    std::vector<double>& values = givenValues_.emplace_back();
-    if (parameter.parameterType != ParameterType::variable) continue;
-    for (const ParameterSet& set : sample.modelScale) values.push_back(set[variable]);
-    ++variable;
-    warnOffGrid(parameter, values, section);
-  }
+  keepAsGiven(reading, sample.modelScale, section, kInitialSampleFileKeyword);
   const std::size_t distinct = std::set<ParameterSet>(sample.sets.begin(), sample.sets.end()).size();
   if (distinct == sample.sets.size()) return;
   const bool hasOther = initialSample.includeInitialParameters && sample.sets.front() != space.initial;
   const char* const meaning = hasOther ? "with the initial set the sample has two different points"
                                        : "a search proposes nothing else among equal points";
-  section.warn(kInitialSampleFileKeyword, distinct == 1
-                                              ? fmt::format("its {} sets are the same: {}", sample.sets.size(), meaning)
-                                              : fmt::format("{} of its {} sets are repetitions of others",
-                                                            sample.sets.size() - distinct, sample.sets.size()));
+  section.warn(kInitialSampleFileKeyword,
+               distinct == 1 ? fmt::format("its {} sets are the same: {}", sample.sets.size(), meaning)
+                             : fmt::format("{} of its {} sets {}", sample.sets.size() - distinct, sample.sets.size(),
+                                           sample.sets.size() - distinct == 1 ? "is a repetition of another"
+                                                                              : "are repetitions of others"));
+}
+
+void OptimisationTask::keepAsGiven(const TaskReading& reading, std::span<const ParameterSet> modelScale,
+                                   const SetupSection& section, std::string_view keyword) {
+  std::size_t variable = 0;
+  for (const ModelParameter& parameter : reading.parameters) {
+    std::vector<double>& values = givenValues_.emplace_back();
+    if (parameter.parameterType != ParameterType::variable) continue;
+    for (const ParameterSet& set : modelScale) values.push_back(set[variable]);
+    ++variable;
+    warnOffGrid(parameter, values, section, keyword);
+  }
+}
+
+/// Sets of an earlier run, which begin the sample.
+void OptimisationTask::readEarlierResults(const TaskReading& reading, const SetupSection& section) {
+  const std::string& file = initialSample.earlierFile;
+  if (file.empty()) {
+    for (const std::string_view keyword : {kEarlierOrderKeyword, kEarlierSetsKeyword}) {
+      if (section.isWritten(keyword))
+        section.warn(keyword, fmt::format("has no effect without {}", kEarlierFileKeyword));
+    }
+    return;
+  }
+  constexpr std::string_view kInvalid = "Error: Earlier result file invalid";
+  if (initialSample.generation == SampleGeneration::fromFile) {
+    section.refuse(kInvalid, kEarlierFileKeyword, "expected this or Initial_Sample_Generation = 4, found both");
+  }
+  validateFileOpens(file, kEarlierFileKeyword, section);
+  std::error_code none;
+  if (std::filesystem::equivalent(file, runFilePath(reading.filePrefix, facts().resultFiles.results), none)) {
+    section.refuse(kInvalid, kEarlierFileKeyword,
+                   "expected another file than the one that this run writes: copy it, with the one ending in "
+                   "_Restart.dat, under another name");
+  }
+  const std::int64_t population = method->populationSize();
+  const bool hasInitial = initialSample.includeInitialParameters;
+  const std::int64_t room =
+      population > 0 ? population - (hasInitial ? 1 : 0) : std::numeric_limits<std::int32_t>::max();
+  std::int64_t most = initialSample.mostEarlierSets;
+  if (most == 0) most = population > 0 ? room : 1;
+  if (most > room) {
+    section.warn(kEarlierSetsKeyword,
+                 fmt::format("only {} of {} sets can be used by a population of {}", room, most, population));
+  }
+  std::string reason;
+  const std::string text = readTextFile(file, reason).value_or(std::string());
+  const std::string settings =
+      readTextFile(runFilePath(std::string(file, 0, file.rfind(".dat")), run_files::restartFile("_Restart")), reason)
+          .value_or(std::string());
+  const SearchSpace space = BuildSearchSpace(reading.parameters);
+  auto sets =
+      readEarlierSets(file, text, settings, initialSample.earlierOrder, static_cast<std::size_t>(std::min(most, room)),
+                      space, hasInitial ? std::optional(space.initial) : std::nullopt, reason);
+  if (!sets) section.refuse(kInvalid, kEarlierFileKeyword, reason);
+  if (sets->outsideCount > 0) {
+    section.warn(kEarlierFileKeyword,
+                 fmt::format("{} left out, as values lie outside the bounds; the first: {}",
+                             countText(sets->outsideCount, "set") + (sets->outsideCount == 1 ? " is" : " are"),
+                             sets->firstOutside));
+  }
+  earlierSets_ = *std::move(sets);
+  initialSample.earlierSetCount = earlierSets_.sets.size();
+  keepAsGiven(reading, earlierSets_.modelScale, section, kEarlierFileKeyword);
 }
 
 std::vector<double> OptimisationTask::givenValues(std::size_t parameter) const {
@@ -303,7 +369,14 @@ void OptimisationTask::readStopping(const SetupSection& section, std::size_t var
 
 void OptimisationTask::readSurrogate(const TaskReading& reading, const SetupSection& section,
                                      const SetupSection& stoppingSection) {
-  const SetupSection control = section.open(nameInside(surrogateSection().row));
+  const std::string_view name = nameInside(surrogateSection().row);
+  if (!usesSurrogate() && !section.has(name)) {
+    section.refuse(fmt::format("Error: Unable to open section {} in KDX file", name), kSurrogateKeyword,
+                   fmt::format("{} uses no surrogate model: expected 0. With 1 the section is needed, though it has no "
+                               "effect",
+                               method->facts().longName));
+  }
+  const SetupSection control = section.open(name);
   SurrogateSection filled{surrogate, reading.variableCount};
   control.read(surrogateSection(), filled);
   if (!usesSurrogate()) {
@@ -335,11 +408,19 @@ std::string OptimisationTask::description() const {
 }
 
 std::vector<std::string> OptimisationTask::summaryLines(const SearchSpace& space) const {
-  if (!usesSurrogate()) return {};
-  return {fmt::format(
+  std::vector<std::string> lines;
+  if (!initialSample.earlierFile.empty()) {
+    lines.push_back(fmt::format("Initial sample: {} of {}, {} of {}, run anew",
+                                countText(earlierSets_.sets.size(), "set"), initialSample.earlierFile,
+                                initialSample.earlierOrder == EarlierOrder::best ? "the best" : "the first",
+                                countText(earlierSets_.successCount, "successful evaluation")));
+  }
+  if (!usesSurrogate()) return lines;
+  lines.push_back(fmt::format(
       "Surrogate model: {} fitted to the {} nearest sets, chooses one of {} proposals; loops without it: {}",
       surrogateModelName(surrogate), neighbourhoodSize(surrogate, space.size()), proposalsPerRun(surrogate),
-      surrogate.initialGenerations)};
+      surrogate.initialGenerations));
+  return lines;
 }
 
 std::optional<OneSlotOnly> OptimisationTask::needsOneSlot() const {
@@ -358,8 +439,9 @@ void OptimisationTask::warnOfGivenSets(const TaskContext& context, const SearchP
   std::vector<ParameterSet> given;
   if (initialSample.includeInitialParameters) given.push_back(problem.bounds.initial);
   given.insert(given.end(), problem.givenSample.begin(), problem.givenSample.end());
+  const std::int64_t population = method->populationSize();
   const auto most = static_cast<std::size_t>(
-      std::min<std::int64_t>(std::max<std::int64_t>(method->populationSize(), 1), stopping.maxEvaluations));
+      std::min<std::int64_t>(population > 0 ? population : std::ssize(given), stopping.maxEvaluations));
   if (given.size() > most) given.resize(most);
   warnOfInfeasibleSets(context, given, "given sets of the initial sample", stopping.maxEvaluations);
 }
@@ -371,6 +453,8 @@ SearchProblem OptimisationTask::problemOf(const SearchSpace& space, const Feasib
   if (method->facts().drawsInitialSample && initialSample.generation == SampleGeneration::fromFile) {
     problem.givenSample = sampleText_ ? readInitialSample(initialSample.fileName, *sampleText_, space).sets
                                       : loadInitialSample(initialSample.fileName, space).sets;
+  } else {
+    problem.givenSample = earlierSets_.sets;
   }
   problem.feasibility = feasibility;
   return problem;

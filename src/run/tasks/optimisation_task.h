@@ -45,6 +45,9 @@ class OptimisationTask final : public Task {
   bool usesSurrogate() const { return surrogateUse == SurrogateUse::yes && method->facts().usesSurrogate; }
   void warnOfUnusedSample(const SetupSection& section) const;
   void takeGivenValues(const TaskReading& reading, const SetupSection& section);
+  void readEarlierResults(const TaskReading& reading, const SetupSection& section);
+  void keepAsGiven(const TaskReading& reading, std::span<const ParameterSet> modelScale, const SetupSection& section,
+                   std::string_view keyword);
   void readMethod(const TaskReading& reading, const SetupSection& section) const;
   void readStopping(const SetupSection& section, std::size_t variableCount);
   void warnOfOneLoop(const SetupSection& section) const;
@@ -55,7 +58,8 @@ class OptimisationTask final : public Task {
   SearchSummary search(const TaskContext& context) const;
 
   std::optional<std::string> sampleText_;         ///< of a sample file, which is read once
-  std::vector<std::vector<double>> givenValues_;  ///< those of a sample file, one entry per model parameter
+  std::vector<std::vector<double>> givenValues_;  ///< those of a file, one entry per model parameter
+  EarlierSets earlierSets_;                       ///< of an earlier run
   std::vector<EarlierSearch> earlierSearches_;
 };
 

@@ -47,6 +47,7 @@ struct TaskReading {
   /// Refuses an aggregation method whose scales are neither given in the setup nor determined from an initial sample.
   std::function<void(bool hasInitialSample)> requireScales;
   EvaluationPeriod period = {};
+  std::string filePrefix = {};  ///< folder and name of the setup: the beginning of the paths of the run's files
 };
 
 /// What was expected instead of so many sets of n parameters, all of which are in memory; empty if they fit into it.

@@ -103,6 +103,22 @@ TEST_F(PosixProcessLauncherTest, EndsAreToldApart) {
   }
 }
 
+/// What a batch system sends to all processes of a job may reach the model before the program.
+TEST_F(PosixProcessLauncherTest, AnEndThatMayBeThatOfTheWholeJobIsToldHalfASecondLater) {
+  addItem("run.sh");
+  for (const char* ending : {"kill -TERM $$", "kill -KILL $$", "kill -HUP $$", "exit 143"}) {
+    folder_.write("base/run.sh", std::string("#!/bin/sh\n") + ending + "\n", 0755);
+    initialise();
+    launcher_.createProcesses(1);
+    ASSERT_TRUE(waitUntil([&] { return isExecuting(1) && launcher_.failure(1).kind != Kind::none; })) << ending;
+    now_ += 0.4;
+    launcher_.waitForChange(0.01);
+    EXPECT_TRUE(isExecuting(1)) << ending;
+    now_ += 0.2;
+    EXPECT_EQ(finish(1), BatchStatus::failed) << ending;
+  }
+}
+
 TEST_F(PosixProcessLauncherTest, GivesTheBatchAPlainSurrounding) {
   // What this process happens to have set must not reach the model.
   const int leaked = ::open("/dev/null", O_RDONLY);

@@ -52,6 +52,26 @@ TEST(EpanetResults, ReadsEveryItem) {
   }
 }
 
+/// The codes that EPANET 2.3.5 writes for UNITS and PRESSURE of a network.
+TEST(EpanetResults, KnowsTheUnitsOfEveryVersion) {
+  const std::tuple<std::int32_t, std::int32_t, const char*, const char*, const char*> cases[] = {
+      {0, 0, "ft3/s", "ft", "psi"}, {1, 4, "gal/min", "ft", "ft"}, {4, 1, "acre ft/d", "ft", "kPa"},
+      {5, 3, "L/s", "m", "bar"},    {9, 1, "m3/d", "m", "kPa"},    {10, 2, "m3/s", "m", "m"},
+      {11, 5, "", "m", ""},  // of a version to come
+  };
+  const TemporaryFolder folder;
+  for (const auto& [flowCode, pressureCode, flow, head, pressure] : cases) {
+    const std::string path =
+        folder.write("u.out", Bytes::with(Bytes::with(epanetFile(1), 36, flowCode), 40, pressureCode));
+    EpanetResults series;
+    ASSERT_TRUE(series.open(path)) << series.lastError();
+    EXPECT_EQ(series.itemUnit(1), flow) << flowCode;
+    EXPECT_EQ(series.itemUnit(2), head) << flowCode;
+    EXPECT_EQ(series.itemUnit(3), pressure) << pressureCode;
+    EXPECT_EQ(series.itemUnit(9), flow) << flowCode;
+  }
+}
+
 TEST(EpanetResults, RefusesWhatIsNotWholeOrNotItsOwn) {
   const std::string whole = epanetFile(2);
   const std::size_t size = whole.size();

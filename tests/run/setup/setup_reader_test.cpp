@@ -184,10 +184,13 @@ TEST_F(SetupReaderTest, EchoesEverySectionAndValueInReadingOrder) {
                               "[MIREVO_SIMULATION_OPTION]\n"
                               "  Option = 2 ('optimisation')\n"
                               "  Title = 'Upper catchment'\n"
+                              "  Base_Folder = '' (default)\n"
                               "  Restart = 0 ('no') (default)\n"
                               "  Reuse_Results = 1 ('yes') (default)\n"
                               "  FailedRunFolders = 3 (default)\n"
                               "  Report = 1 ('yes') (default)\n"
+                              "  Improvement_Command = '' (default)\n"
+                              "  Improvement_Command_Time = 60 (default)\n"
                               "[MIREVO_SIMULATION_OPTION/SIMBATCH]\n"
                               "  TqSEKdxListItemCount = 1\n"
                               "[MIREVO_SIMULATION_OPTION/SIMBATCH/SIMBATCHITEM_1]\n"
@@ -211,6 +214,7 @@ TEST_F(SetupReaderTest, EchoesEverySectionAndValueInReadingOrder) {
 TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatAreSeldomMeant) {
   folder_.write("same.txt", "Depth Rate\n200 0.5\n200 0.5\n");
   folder_.write("steps.txt", "Depth Rate\n200 0.5\n200.5 0.5\n200 0.5\n");
+  folder_.write("earlier.dat", "Evaluation\tStatus\tRate\tDepth\tAggregate\n1\tOK\t1.5\t200\t1\n2\tOK\t0.5\t200\t2\n");
   // warning: none where it is empty
   const std::pair<const char*, const char*> cases[] = {
       {"Weight_Above = 2.5 => Weigth_Abov = 2.5",
@@ -290,6 +294,20 @@ TEST_F(SetupReaderTest, WarnsOfWhatItDoesNotReadAndOfSettingsThatAreSeldomMeant)
        "Transformation_Type: has no effect on a dependent parameter"},
       {"TqSEKdxListItemCount = 2 => 1",
        "setup.kdx:85:21: File_Name: has no effect, as no output measure has Interface_Type = 1"},
+      {"'model/measures.txt' => 'model/measures.txt'\nInstruction_File = 'none.ins' & Interface_Type = 1 => 0 & "
+       "Function_Name = '' => [SIMULATION_FILE]\nFile_Name = 'model/flow.csv'\n[/SIMULATION_FILE]\n"
+       "[OBSERVATION_FILE]\nFile_Name = 'gauge.csv'\n[/OBSERVATION_FILE]",
+       "Instruction_File: not read, as no output measure has Interface_Type = 1"},
+      {"'model/flow.csv' => 'model/flow.csv'\nInstruction_Step = 24.0",
+       "setup.kdx:72:20: Instruction_Step: has no effect without Instruction_File"},
+      {"Initial_Sample_Generation = 4 => Initial_Sample_Generation = 4\nEarlier_Result_Order = 'first'",
+       "Earlier_Result_Order: has no effect without Earlier_Result_File"},
+      {"'sample.txt' => '' & Initial_Sample_Generation = 4 => Initial_Sample_Generation = 1\nEarlier_Result_File = "
+       "'earlier.dat'\nEarlier_Result_Sets = 2",
+       "Earlier_Result_File: 1 set is left out, as values lie outside the bounds; the first: "},
+      {"'sample.txt' => '' & Initial_Sample_Generation = 4 => Initial_Sample_Generation = 1\nEarlier_Result_File = "
+       "'earlier.dat'\nEarlier_Result_Sets = 99",
+       "Earlier_Result_Sets: only 19 of 99 sets can be used by a population of 20"},
       {"Aggregation_Method = 0 => 3 & Option = 2 => 0 & NoSimultaneousSim = 4 => 1", ""},
       {"Statistic_Type = 1 => 0 & Function_Type = 2 => 0",
        "setup.kdx:92:25: Function_Type: a sum with a difference that may be negative (\"Flow error\") is the smaller "

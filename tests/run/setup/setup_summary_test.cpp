@@ -32,7 +32,7 @@ TEST_F(SetupSummaryTest, SaysWhatTheRunIsAboutToDo) {
       "  Flow error: root mean square, weight 1.25 (above 2.5), objective function Flow\n"
       "  Written: written by the model, weight 1 (above 1), objective function none\n"
       "Objective functions: 1\n"
-      "  Flow: sum of squares of 1 output measures, weight 0.75, standard deviation 2.5\n"
+      "  Flow: sum of squares of 1 output measure, weight 0.75, standard deviation 2.5\n"
       "Aggregation: No transformation\n"
       "Random seed: -77\n"
       "Model evaluations planned: 500 and a final model run\n"

@@ -23,6 +23,13 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
   folder_.write("two.ins", "pif ~\nl1 !head_1! !head_2!\n");
   folder_.write("no.ins", "pif ~\nl1 !head_1!\nx !head_2!\n");
   const std::string instructed = "'model/measures.txt' => 'model/measures.txt'\nInstruction_File = 'two.ins'";
+  const std::string listed = "'model/flow.csv' => 'model/flow.csv'\nInstruction_File = ";
+  const std::string earlier =
+      "'sample.txt' => '' & Initial_Sample_Generation = 4 => Initial_Sample_Generation = 1\n"
+      "Earlier_Result_File = ";
+  folder_.write("earlier.dat", "Evaluation\tStatus\tDepth\tRate\tAggregate\n1\tOK\t99\t0.5\t1\n");
+  folder_.write("other.dat", "Evaluation\tStatus\tDepth\tRise\tAggregate\n1\tOK\t99\t0.5\t1\n");
+  folder_.write("setup_Optimisation.dat", "Evaluation\tStatus\tDepth\tRate\tAggregate\n1\tOK\t200\t0.5\t1\n");
   // The first line behind "Error: ", whole, and what the lines below it hold.
   const std::tuple<std::string, std::string, const char*> cases[] = {
       // The model and its files
@@ -97,6 +104,16 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
        "Weights of observations invalid for output measure Flow error", "found 2 in Quality_Left_Out, too"},
       {"'gauge.csv' => 'gauge.csv'\nQuality_Item_No = 9\nQuality_Down_Weighted = 2\nQuality_Weight = 1",
        "Weights of observations invalid for output measure Flow error", "found 1, with which the codes change nothing"},
+      {"'gauge.csv' => 'gauge.csv'\nWeight_Item_Name = 'w'\nError_Item_No = 3",
+       "Weights of observations invalid for output measure Flow error", "expected Weight_Item_Name or Error_Item_No"},
+      {"'gauge.csv' => 'gauge.csv'\nQuality_Item_Name = 'code'",
+       "Weights of observations invalid for output measure Flow error", "Quality_Item_Name: expected Quality_Left_Out"},
+      {"'gauge.csv' => 'gauge.csv'\nTime_Format = 'DD.MM.YY'", "Form of a text file invalid",
+       "Time_Format: expected YYYY, MM"},
+      {"'gauge.csv' => 'gauge.csv'\nHeader_Rows = -1", "Form of a text file invalid", "expected 0 to 100, found -1"},
+      {"'gauge.csv' => 'gauge.csv'\nTime_Unit = 'weeks'",
+       "Unable to read keyword in section OBSERVATION_FILE in KDX file",
+       "Time_Unit: expected one of the names 'seconds'"},
       {"Statistic_Type = 1 => 'KGE-NP' & 'gauge.csv' => 'gauge.csv'\nError_Item_No = 9",
        "Weights of observations invalid for output measure Flow error",
        "Error_Item_No: the statistic 'KGE-NP' has no weighted form"},
@@ -156,8 +173,29 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
        "Measurement No. invalid for output measure Written", "two.ins, found \"Head_3\", did you mean head_1?"},
       {instructed + " & MeasurementNo = 3 => Measurement_Name = 'head_2'\nMeasurementNo = 2",
        "Measurement No. invalid for output measure Written", "expected this or MeasurementNo, found both"},
+      {instructed + " & [OUTPUT_MEASURE_FILE] => [FURTHER_FILES]\nTqSEKdxListItemCount = 1\n[FURTHER_FILE_1]\n"
+                    "File_Name = 'model/b.txt'\nInstruction_File = 'two.ins'\n[/FURTHER_FILE_1]\n[/FURTHER_FILES]\n"
+                    "[OUTPUT_MEASURE_FILE]",
+       "Invalid instruction file", "two.ins, found \"head_1\""},
+      {"[OUTPUT_MEASURE_FILE] => [FURTHER_FILES]\nTqSEKdxListItemCount = 1\n[FURTHER_FILE_1]\n"
+       "File_Name = 'model/b.txt'\nInstruction_File = 'two.ins'\n[/FURTHER_FILE_1]\n[/FURTHER_FILES]\n"
+       "[OUTPUT_MEASURE_FILE]",
+       "Instruction file of the output-measure file not defined", "since there are FURTHER_FILES"},
       {"MeasurementNo = 3 => Measurement_Name = 'head_2'", "Measurement No. invalid for output measure Written",
        "or Instruction_File in OUTPUT_MEASURE_FILE"},
+      {listed + "'none.ins'\nInstruction_Dates = 'YYYYMM'", "Invalid instruction file",
+       "Instruction_File: none.ins: No such file"},
+      {listed + "'no.ins'\nInstruction_Dates = 'YYYYMM'", "Invalid instruction file",
+       "Instruction_File: no.ins:3:1: expected a line to begin with"},
+      {listed + "'two.ins'", "Invalid instruction file",
+       "setup.kdx:72:20: Instruction_File: expected one way of telling the times of its numbers beside it"},
+      {listed + "'two.ins'\nInstruction_Times = 'none.csv'", "Invalid times of the numbers in a listing",
+       "setup.kdx:73:21: Instruction_Times: none.csv: No such file"},
+      {listed + "'two.ins'\nInstruction_Dates = 'YYYY'", "Invalid times of the numbers in a listing",
+       "Instruction_Dates: expected MM in the form of dates, found \"YYYY\""},
+      {listed + "'two.ins'\nInstruction_Start = 2001-01-01\nInstruction_Step = 0.0",
+       "Step of the numbers in a listing invalid for output measure Flow error",
+       "expected greater than 0 and at most 1000000, found 0"},
       // Tasks
       {"Option = 2 => 0 & TqSEKdxListItemCount = 1\n      [SCENARIO_1] => 0\n      [SCENARIO_1]",
        "No scenario runs defined", ""},
@@ -182,6 +220,22 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
       {"Algorithm_Type = 1 => 2 & NoSimultaneousSim = 4 => 1 & Max_No_Evaluations = 500 => 0",
        "Maximum No. of model evaluations in DDS algorithm invalid", ""},
       {"'sample.txt' => '/dev/zero'", "Unable to open /dev/zero", "Not a regular file"},
+      {earlier + "'none.dat'", "Unable to open none.dat", "Earlier_Result_File: "},
+      {earlier + "'setup_Optimisation.dat'", "Earlier result file invalid",
+       "expected another file than the one that this run writes: copy it"},
+      {earlier + "'other.dat'", "Earlier result file invalid",
+       "other.dat:1: expected the variable parameters of this setup, found no \"Rate\" and in their place \"Rise\""},
+      {earlier + "'earlier.dat'", "Earlier result file invalid",
+       "earlier.dat: no set lies within the bounds; the first: earlier.dat:2: Depth = 99"},
+      {earlier + "'setup_Optimisation.dat'\nEarlier_Result_Sets = 0", "No. of sets of the earlier result file invalid",
+       "expected 1 or more, found 0"},
+      {"Initial_Sample_Generation = 4 => Initial_Sample_Generation = 4\nEarlier_Result_File = 'other.dat'",
+       "Earlier result file invalid", "expected this or Initial_Sample_Generation = 4, found both"},
+      {"Algorithm_Type = 1 => 'PDDS' & [SURROGATE_MODEL_PARAMETERS] => [X] & [/SURROGATE_MODEL_PARAMETERS] => [/X]",
+       "Unable to open section SURROGATE_MODEL_PARAMETERS in KDX file",
+       "Use_Surrogate_Model: Parallel Dynamically Dimensioned Search uses no surrogate model: expected 0"},
+      {"Algorithm_Type = 1 => 3", "Invalid optimisation algorithm type selection",
+       "expected 0 to 2 or one of the names 'SCE', 'PSE', 'DDS', 'PDDS', 'OPSE', found 3"},
       {"'sample.txt' => ''", "Unable to open ", "expected the name of a file, found a blank text"},
       {"'sample.txt' => 'none.txt'", "Unable to open none.txt", "No such file"},
       {"Neighbourhood_Size = 60 => 5 & Sampling_rate = 30 => 0",
@@ -316,7 +370,8 @@ TEST_F(ValidationTest, RefusesNumbersOutsideTheRangeOfTheirRow) {
       const std::string number = isReal ? fmt::format("{:.15g}", value) : fmt::format("{:.0f}", value);
       const std::string error = failureOf(withValue(text, section->path, facts.name, number));
       EXPECT_THAT(error, StartsWith(std::string(facts.refusal)));
-      EXPECT_THAT(error, HasSubstr(fmt::format("{}: expected {}, found ", facts.name, facts.range.text())));
+      EXPECT_THAT(error, AllOf(HasSubstr(fmt::format("{}: expected {}", facts.name, facts.range.text())),
+                               HasSubstr(", found ")));
       EXPECT_THAT(error, HasSubstr("\nsetup.kdx:")) << "every refusal names its location";
       ++checked;
     }
@@ -333,7 +388,9 @@ TEST_F(ValidationTest, CodesAreTakenByNumberOrByName) {
     for (const CodeName& code : row->facts.codes) {
       std::string shouted(code.name);
       for (char& c : shouted) c = static_cast<char>(std::toupper(static_cast<unsigned char>(c)));
-      const std::string byName = withValue(text, section->path, row->name(), "' " + shouted + " '");
+      const bool needsOrigin = row->name() == "Time_Unit";
+      const std::string byName = withValue(text, section->path, row->name(),
+                                           "' " + shouted + " '" + (needsOrigin ? "\nTime_Origin = 2001-01-01" : ""));
       if (!code.code) {
         EXPECT_EQ(failureOf(byName), "");
         continue;

@@ -1,0 +1,168 @@
+#include "run/setup_check.h"
+
+#include <cstdint>
+#include <new>
+#include <optional>
+#include <string_view>
+#include <utility>
+#include <vector>
+
+#include <fmt/core.h>
+
+#include "common/clock.h"
+#include "common/fatal_error.h"
+#include "common/run_files.h"
+#include "common/text.h"
+#include "evaluation/local_evaluator.h"
+#include "platform/processes/child_guard.h"
+#include "platform/processes/folder_tree.h"
+#include "platform/processes/posix_process_launcher.h"
+#include "platform/signals/signal_state.h"
+#include "platform/terminal/front_end.h"
+#include "run/check_text.h"
+#include "run/run_model.h"
+#include "run/setup/setup_reader.h"
+#include "run/signal_handlers.h"
+
+namespace mirevo {
+namespace {
+
+class SetupCheck final {
+ public:
+  SetupCheck() {
+    log_.passWarningsTo([this](std::string_view record) { warn(record); });
+  }
+
+  void run(const std::string& setupFileName);
+  int exitCode() const { return exitCode_; }
+
+ private:
+  void print(std::string_view text) {
+    if (writeAnswer(std::string(text) + "\n") != 0) exitCode_ = 1;
+  }
+  void warn(std::string_view record) {
+    ++warningCount_;
+    print(record);
+  }
+  void runModel();
+  /// Throws FatalError if the run yields no result.
+  void judgeRun(ModelRunner& runner, ProcessLauncher& launcher, std::span<const double> set);
+  static EvaluationResult resultOf(ModelRunner& runner, ProcessLauncher& launcher, std::span<const double> set);
+  void printParameters(ParameterModel& parameters);
+  void printResult(const EvaluationResult& result, ModelRunner& runner);
+
+  RunLog log_;  ///< never opened: of it the warnings alone are needed
+  RunConfig config_;
+  int warningCount_ = 0;
+  int exitCode_ = 0;
+};
+
+void SetupCheck::run(const std::string& setupFileName) {
+  installSignalHandlers();
+  const SetupLocation setup = locateSetup(setupFileName);
+  requireSetupFile(setup);
+  print("Check of " + setup.file);
+  config_ = readSetupFile(setupFileName, log_);
+  print("Task: " + config_.taskDescription());
+  if (config_.task) print(fmt::format("Planned model runs: {}", config_.plannedModelRuns()));
+  runModel();
+  if (exitCode_ != 0) return;
+  print(fmt::format("Nothing is wrong{}; no file of a run was made or changed",
+                    warningCount_ == 0 ? std::string()
+                                       : ", but for " + countText(static_cast<std::size_t>(warningCount_), "warning")));
+}
+
+void SetupCheck::runModel() {
+  ParameterModel parameters(config_.parameters, config_.constraints);
+  ObjectiveAggregator aggregator(config_.objectives, config_.aggregationMethod);
+  if (config_.task) config_.task->requireSets(parameters.searchSpace(), parameters.feasibility());
+  PosixProcessLauncher launcher;
+  signalState.haltProcesses = haltProcessesFromSignal;
+  ModelDescription model = describeModel(config_);
+  model.runsAtOnce = 1;
+  model.hasShownSeries = true;
+  LauncherSettings settings = launcherSettings(config_, 1);
+  settings.processFolderPrefix = runFilePath(processFolderPrefix(config_), run_files::kCheckFolder);
+  const auto warnAbout = [this](std::string_view text) { log_.warning(text); };
+  settings.warn = warnAbout;
+  ModelRunner runner(std::move(model), parameters, aggregator, launcher, settings);
+  for (const std::string& text : modelDoubts(config_, parameters, runner)) warnAbout(text);
+  printParameters(parameters);
+  const std::string folder = launcher.getProcessFolder(1);
+  print(fmt::format("The model is run in {}", folder));
+  try {
+    judgeRun(runner, launcher, parameters.searchSpace().initial);
+  } catch (const FatalError& error) {
+    const std::string kept = "The folder in which the model was run is kept: " + folder;
+    fatalError(error.message(), error.detail().empty() ? kept : error.detail() + "\n" + kept);
+  }
+  removeTree(folder);  // while it is still locked
+}
+
+void SetupCheck::judgeRun(ModelRunner& runner, ProcessLauncher& launcher, std::span<const double> set) {
+  const double began = runTimeClock();
+  const EvaluationResult result = resultOf(runner, launcher, set);
+  print(fmt::format("It took {:.2f} s, with the reading of its results", runTimeClock() - began));
+  for (const std::string& text : result.warnings) log_.warning(text);
+  for (const UnusedObservations& unused : result.unusedObservations) print(unused.text);
+  if (const std::string left = launcher.leftBehind(1); !left.empty()) log_.warning(left);
+  if (result.ok()) return printResult(result, runner);
+  std::string detail = result.failure->reason;
+  for (const std::string& line : result.failure->lastOutput) detail += "\n   " + line;
+  fatalError(
+      fmt::format("Error: The evaluation of the initial values failed: {}", failureKindName(result.failure->kind)),
+      detail);
+}
+
+EvaluationResult SetupCheck::resultOf(ModelRunner& runner, ProcessLauncher& launcher, std::span<const double> set) {
+  if (auto failure = runner.prepareModelRun(set, 1, 1)) return runner.failedResult(std::move(*failure));
+  for (std::int32_t executing = 1, status = 0; executing != 0;) {
+    launcher.isExecuting(1, executing, status);
+    if (executing != 0) launcher.waitForChange(kPollSeconds);
+  }
+  return runner.collect(1);
+}
+
+void SetupCheck::printParameters(ParameterModel& parameters) {
+  const SearchSpace& space = parameters.searchSpace();
+  const std::vector<double> values = ToModelScale(space, space.initial);
+  print("Initial values:");
+  for (std::size_t i = 0; i < space.size(); ++i) {
+    print(fmt::format("   {} = {}", space.names[i], formatReal(values[i])));
+  }
+  for (const std::string& text : otherValueTexts(parameters, values)) print("   " + text);
+}
+
+void SetupCheck::printResult(const EvaluationResult& result, ModelRunner& runner) {
+  const std::vector<PeriodSeries> observations = runner.output().readShownObservations();
+  const CheckedRun run{config_,
+                       result,
+                       runner.output().sources(),
+                       runner.output().shownMeasures(),
+                       observations,
+                       runner.aggregator().isSettled()};
+  for (const std::string& line : checkedRunLines(run)) print(line);
+}
+
+int failed(std::string_view message, std::string_view detail) {
+  showMessage(detail.empty() ? std::string(message) : fmt::format("{}\n{}", message, detail));
+  return 1;
+}
+
+}  // namespace
+
+int checkSetup(const std::string& setupFileName) {
+  try {
+    SetupCheck check;
+    check.run(setupFileName);
+    return check.exitCode();
+  } catch (const FatalError& error) {
+    return failed(trimTrailing(error.message()), error.detail());
+  } catch (const std::bad_alloc&) {
+    return failed("Error: Unable to allocate memory", {});
+  } catch (const std::exception& error) {
+    return failed("Error: Unexpected failure", error.what());
+  }
+}
+
+}  // namespace mirevo
