@@ -7,7 +7,8 @@
 //
 // A case is measured with run times that are exponentially distributed, whatever the parameters are, with times that
 // grow with three parameters, and with equal ones. Run times depend on the parameters alone, so that a case makes the
-// same model runs every time.
+// same model runs every time. The case "output" is of models of 0.5 s that write much, one number of slots after the
+// other; TMPDIR=/dev/shm keeps the disk out of it.
 #include <algorithm>
 #include <cstdlib>
 #include <filesystem>
@@ -34,6 +35,7 @@ struct Case {
   std::string task;  ///< the sections of the setup that say what is run
   int runs = kRuns;
   int option = 2;
+  int rows = 0;  ///< that a model run writes; 0: a few
 };
 
 std::string search(const std::string& algorithm, const std::string& settings) {
@@ -130,7 +132,8 @@ double measure(const std::filesystem::path& folder, const Case& measured, int sl
   writeModel(folder);
   const std::string log = folder / "runs";
   const std::string setup = folder / "busy.kdx";
-  std::ofstream(setup) << setupText(measured, slots, fmt::format("{} {} {}", times, meanSeconds, log));
+  const std::string rows = measured.rows > 0 ? fmt::format(" {}", measured.rows) : "";
+  std::ofstream(setup) << setupText(measured, slots, fmt::format("{} {} {}{}", times, meanSeconds, log, rows));
   run(setup);
   std::vector<std::pair<double, double>> runs;  // start and end
   std::ifstream file(log);
@@ -149,6 +152,26 @@ double measure(const std::filesystem::path& folder, const Case& measured, int sl
 
 bool isWanted(const std::string& name, const std::vector<std::string>& wanted) {
   return wanted.empty() || std::ranges::any_of(wanted, [&](const std::string& each) { return name.starts_with(each); });
+}
+
+void measureLargeOutput(const std::filesystem::path& folder, const std::vector<std::string>& wanted) {
+  constexpr double kSeconds = 0.5;
+  constexpr int kRounds = 16;
+  constexpr std::pair<int, int> kSizes[] = {{0, 0}, {1, 40'000}, {12, 480'000}, {60, 2'400'000}};  // MB and rows
+  fmt::print("\nModel runs of {} s, {} for each slot, that write so much\n\n", kSeconds, kRounds);
+  fmt::print("| | 4 slots | 16 slots |\n|---|---|---|\n");
+  for (const auto& [megabytes, rows] : kSizes) {
+    const std::string name = fmt::format("output {} MB", megabytes);
+    if (!isWanted(name, wanted)) continue;
+    fmt::print("| {} |", name);
+    for (const int slots : {4, 16}) {
+      Case measured = uncertainty(kRounds * slots);
+      measured.rows = rows;
+      fmt::print(" {:.2f} |", measure(folder, measured, slots, "equal", kSeconds));
+      std::fflush(stdout);
+    }
+    fmt::print("\n");
+  }
 }
 
 }  // namespace
@@ -178,6 +201,7 @@ int main(int argc, char** argv) {
       fmt::print("\n");
       std::fflush(stdout);
     }
+    measureLargeOutput(folder / "output", wanted);
   } catch (const std::exception& error) {
     fmt::print(stderr, "{}\n", error.what());
     return 1;

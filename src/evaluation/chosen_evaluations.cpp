@@ -19,11 +19,18 @@ void BestChoice::takeOfSearch(BestEvaluation best) {
   isOfSearch_ = true;
 }
 
+bool InitialChoice::isOfSetup(std::span<const double> parameterValues) const {
+  return std::equal(setupValues_.begin(), setupValues_.end(), parameterValues.begin());
+}
+
+bool InitialChoice::wouldBeInitial(int number, std::span<const double> parameterValues) const {
+  const bool hasThem = isOfSetup(parameterValues);
+  return !number_ || (hasThem && !hasSetupValues_) || (hasThem == hasSetupValues_ && number < *number_);
+}
+
 bool InitialChoice::consider(int number, std::span<const double> parameterValues) {
-  const bool isOfSetup = std::equal(setupValues_.begin(), setupValues_.end(), parameterValues.begin());
-  const bool isInitial =
-      !number_ || (isOfSetup && !hasSetupValues_) || (isOfSetup == hasSetupValues_ && number < *number_);
-  if (isInitial) resume(number, isOfSetup);
+  const bool isInitial = wouldBeInitial(number, parameterValues);
+  if (isInitial) resume(number, isOfSetup(parameterValues));
   return isInitial;
 }
 

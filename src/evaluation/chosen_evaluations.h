@@ -41,6 +41,8 @@ class InitialChoice final {
 
   /// Considers a successful evaluation; its values are on the model scale. Whether it is the initial one now.
   bool consider(int number, std::span<const double> parameterValues);
+  /// Whether it would be; once it would not, it will never be.
+  bool wouldBeInitial(int number, std::span<const double> parameterValues) const;
   /// Restores the choice of an earlier run.
   void resume(int number, bool hasSetupValues);
 
@@ -50,6 +52,8 @@ class InitialChoice final {
   bool hasSetupValues() const { return hasSetupValues_; }
 
  private:
+  bool isOfSetup(std::span<const double> parameterValues) const;
+
   std::vector<double> setupValues_;
   std::optional<int> number_;
   bool hasSetupValues_ = false;

@@ -42,12 +42,13 @@ EvaluationResult LocalEvaluator::awaitFirst() {
 }
 
 UnfinishedBatch LocalEvaluator::takeUnfinished() {
+  runner_.endReading();
   for (Slot& slot : slots_) slot.running.reset();
   return ledger_.takeUnfinished();
 }
 
 void LocalEvaluator::goOn() {
-  if (!takeFinished()) runner_.launcher().waitForChange(kPollSeconds);
+  if (!takeFinished()) runner_.launcher().waitForChange(kPollSeconds, runner_.readingSockets());
   stopIfCancelled();
   startInFreeSlots();
 }
@@ -67,7 +68,7 @@ void LocalEvaluator::startNext(int slot) {
     auto failure = runner_.prepareModelRun(ledger_.set(*place), slot, ledger_.numberOf(*place));
     if (!failure) {
       ledger_.markInitiated(*place, runTimeClock());
-      slots_[static_cast<std::size_t>(slot - 1)].running = Running{*place, {}};
+      slots_[static_cast<std::size_t>(slot - 1)].running.emplace().place = *place;
       return;
     }
     ledger_.finish(*place, runner_.failedResult(std::move(*failure)));
@@ -93,13 +94,8 @@ bool LocalEvaluator::takeFinished() {
     if (!running) continue;
     const std::size_t place = running->place;
     if (!running->ended) {
-      std::int32_t executing = 0;
-      std::int32_t status = 0;
-      runner_.launcher().isExecuting(slot, executing, status);
-      if (executing != 0) continue;
-      ledger_.markEnded(place, runTimeClock());
-      running->ended = runner_.collect(slot, [this] { stopIfCancelled(); });
-      runner_.keepOutputFiles(slot, ledger_.numberOf(place), *running->ended, ledger_.repeatedMeasures(place));
+      if (!isRead(slot, *running)) continue;
+      any = true;  // others may have waited to be read
     }
     // The slot waits, too, as the folder of a failed run may be kept.
     if (!ledger_.judge(place, *running->ended)) continue;
@@ -113,9 +109,37 @@ bool LocalEvaluator::takeFinished() {
   return any;
 }
 
+bool LocalEvaluator::isRead(int slot, Running& running) {
+  if (!running.hasEnded) {
+    std::int32_t executing = 0;
+    std::int32_t status = 0;
+    runner_.launcher().isExecuting(slot, executing, status);
+    if (executing != 0) return false;
+    ledger_.markEnded(running.place, runTimeClock());
+    running.hasEnded = true;
+  }
+  const auto look = [this] { stopIfCancelled(); };
+  const bool isBeside = runner_.isBeingRead(slot) || !isOnlyOne(slot);
+  running.ended = isBeside ? runner_.collectBeside(slot, look) : runner_.collect(slot, look);
+  if (!running.ended) return false;
+  runner_.keepOutputFiles(slot, ledger_.numberOf(running.place), *running.ended,
+                          ledger_.repeatedMeasures(running.place));
+  return true;
+}
+
+/// Then there is nothing to be done while its results are read.
+bool LocalEvaluator::isOnlyOne(int slot) const {
+  for (int other = 1; other <= static_cast<int>(slots_.size()); ++other) {
+    const auto& running = slots_[static_cast<std::size_t>(other - 1)].running;
+    if (other != slot && running && !running->ended) return false;
+  }
+  return true;
+}
+
 void LocalEvaluator::stopIfCancelled() {
   if (!observer_.isCancelled()) return;
   observer_.message("Simulation cancelled");
+  runner_.endReading();
   runner_.launcher().haltProcesses();
   throw RunCancelled();
 }

@@ -32,6 +32,7 @@ class LocalEvaluator final : public Evaluator {
   /// A model run in a slot.
   struct Running {
     std::size_t place = 0;                  ///< of its set in the ledger
+    bool hasEnded = false;                  ///< its batch; its results may be being read
     std::optional<EvaluationResult> ended;  ///< waits for the first successful run, see EvaluationLedger::judge()
   };
   struct Slot {
@@ -48,6 +49,9 @@ class LocalEvaluator final : public Evaluator {
   bool isUsable(int slot);
   /// Takes the results of slots whose batch has ended and starts the next sets there; false when none has ended.
   bool takeFinished();
+  /// Whether the slot's model run has ended and its results have been read.
+  bool isRead(int slot, Running& running);
+  bool isOnlyOne(int slot) const;
   void stopIfCancelled();
 
   ModelRunner& runner_;

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <algorithm>
 #include <memory>
 #include <optional>
 #include <string>
@@ -40,6 +41,12 @@ struct ModelDescription {
   bool keepSimulatedValues = false;   ///< results hold the simulated values at the observation times
   SeriesPrecision keptPrecision = SeriesPrecision::single;
   std::optional<KeptSteps> keptSteps = {};  ///< they are kept at simulated steps, too
+
+  /// Whether instruction files read results.
+  bool readsListings() const {
+    return instructions || std::any_of(measures.begin(), measures.end(),
+                                       [](const OutputMeasure& measure) { return measure.simulation.listing; });
+  }
 };
 
 }  // namespace mirevo

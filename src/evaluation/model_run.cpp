@@ -7,6 +7,7 @@
 #include <memory>
 #include <new>
 #include <sys/stat.h>
+#include <sys/sysinfo.h>
 #include <unistd.h>
 #include <utility>
 #include <variant>
@@ -296,6 +297,7 @@ std::optional<EvaluationFailure> ModelRunner::prepareModelRun(std::span<const do
     }
   }
   files.started = runTimeClock() - readingSeconds_;
+  files.ended.reset();
   shownRuns_.begin(slot, number, ToModelScale(parameters_.searchSpace(), set));
   launcher_.createProcesses(slot);
   return std::nullopt;
@@ -317,7 +319,7 @@ EvaluationResult ModelRunner::collect(int slot, std::function<void()> look) {
   };
   const std::unique_ptr<ReadingWatch, decltype(endReading)> reading(&output_->watch(), endReading);
   try {
-    return read(slot);
+    return complete(slot, read(slot));
   } catch (const std::bad_alloc&) {
     output_->release();
     return failedResult({Kind::resultsNotReadable, "reading the files of the model run takes more memory than there is",
@@ -325,37 +327,130 @@ EvaluationResult ModelRunner::collect(int slot, std::function<void()> look) {
   }
 }
 
-/// A model that ended shortly before its limit is left some time for its results.
-void ModelRunner::beginReading(int slot, std::function<void()> look) {
-  constexpr double kLeastSeconds = 1.0;
-  double seconds = kLongestReading;
-  std::string limit = fmt::format("{:g} seconds", kLongestReading);
-  if (maxSeconds_ > 0.0) {
-    // Without the time in which the results of other slots were read, and this one had to wait.
-    const double used = runTimeClock() - readingSeconds_ - slots_.at(static_cast<std::size_t>(slot - 1)).started;
-    seconds = std::max(maxSeconds_ - used, kLeastSeconds);
-    limit = fmt::format("the model run had left of its {:g} seconds", maxSeconds_);
+std::optional<EvaluationResult> ModelRunner::collectBeside(int slot, const std::function<void()>& look) {
+  SlotFiles& files = slots_.at(static_cast<std::size_t>(slot - 1));
+  if (!files.ended) files.ended = runTimeClock() - readingSeconds_;
+  if (!files.reading) {
+    const bool hasFailed = launcher_.failure(slot).kind != BatchFailure::Kind::none;  // and nothing is read of it
+    if (hasFailed || !isWorthProcess()) return collect(slot, look);
+    if (!mayStartReading(files) || startReading(slot)) return std::nullopt;
+    return collect(slot, look);
   }
-  output_->watch().begin(seconds, std::move(limit), std::move(look));
+  switch (files.reading->look()) {
+    case ReadingProcess::State::reading:
+      return std::nullopt;
+    case ReadingProcess::State::done: {
+      const std::unique_ptr<ReadingProcess> reading = std::move(files.reading);
+      return complete(slot, reading->take());
+    }
+    case ReadingProcess::State::lost:
+      break;
+  }
+  files.reading.reset();
+  return collect(slot, look);  // whatever ended it, which the files may have nothing to do with
 }
 
-EvaluationResult ModelRunner::read(int slot) {
+bool ModelRunner::isWorthProcess() const {
+  constexpr double kStarts = 4.0;
+  // What is told once of listings would be told by every process.
+  if (description_.readsListings()) return false;
+  const double expected = std::min(lastReadings_[0], lastReadings_[1]);
+  return leastSecondsBeside_ <= 0.0 || expected >= std::max(leastSecondsBeside_, kStarts * lastStart_);
+}
+
+/// As many at a time as there are processors, and first what has waited longest.
+bool ModelRunner::mayStartReading(const SlotFiles& files) const {
+  const auto count =
+      std::count_if(slots_.begin(), slots_.end(), [](const SlotFiles& each) { return each.reading != nullptr; });
+  if (count >= std::max(1, ::get_nprocs())) return false;
+  return std::none_of(slots_.begin(), slots_.end(), [&files](const SlotFiles& other) {
+    return other.ended && !other.reading && *other.ended < *files.ended;
+  });
+}
+
+bool ModelRunner::startReading(int slot) {
+  // It ends by itself when its time is over, unless it was stopped, or waits for a disk.
+  constexpr double kPatience = 5.0;
+  SlotFiles& files = slots_.at(static_cast<std::size_t>(slot - 1));
+  files.reading = std::make_unique<ReadingProcess>();
+  const double began = runTimeClock();
+  const auto readThere = [this, slot] {
+    beginReading(slot, {});
+    RunReading reading = read(slot);
+    output_->endHelper();
+    return reading;
+  };
+  const bool isStarted = files.reading->start(readThere, secondsToRead(files) + kPatience);
+  lastStart_ = runTimeClock() - began;
+  if (!isStarted) files.reading.reset();
+  return isStarted;
+}
+
+std::vector<int> ModelRunner::readingSockets() const {
+  std::vector<int> sockets;
+  for (const SlotFiles& files : slots_) {
+    if (files.reading) sockets.push_back(files.reading->socket());
+  }
+  return sockets;
+}
+
+void ModelRunner::endReading() {
+  for (SlotFiles& files : slots_) files.reading.reset();
+}
+
+/// A model that ended shortly before its limit is left some time for its results.
+double ModelRunner::secondsToRead(const SlotFiles& files) const {
+  constexpr double kLeastSeconds = 1.0;
+  if (maxSeconds_ <= 0.0) return kLongestReading;
+  // Without the time in which the results of other slots were read, and this one had to wait.
+  const double ended = files.ended.value_or(runTimeClock() - readingSeconds_);
+  return std::max(maxSeconds_ - (ended - files.started), kLeastSeconds);
+}
+
+void ModelRunner::beginReading(int slot, std::function<void()> look) {
+  std::string limit = maxSeconds_ > 0.0 ? fmt::format("the model run had left of its {:g} seconds", maxSeconds_)
+                                        : fmt::format("{:g} seconds", kLongestReading);
+  output_->watch().begin(secondsToRead(slots_.at(static_cast<std::size_t>(slot - 1))), std::move(limit),
+                         std::move(look));
+}
+
+/// What a process that reads can find out: nothing here changes this object for good.
+RunReading ModelRunner::read(int slot) {
+  const double began = runTimeClock();
   auto failure = findBatchFailure(slot);
-  EvaluationResult result =
+  RunReading reading;
+  EvaluationResult& result = reading.result;
+  result =
       failure ? failedResult(std::move(*failure)) : output_->read(slots_.at(static_cast<std::size_t>(slot - 1)).output);
-  const bool mayBeCutOff = result.ok() && output_->mayBeCutOff(result);
+  reading.mayBeCutOff = result.ok() && output_->mayBeCutOff(result);
+  if (result.ok() && description_.hasShownSeries &&
+      (reading.mayBeCutOff || shownRuns_.wouldBeShown(slot, result.aggregate))) {
+    result.shownSeries = output_->readShownSeries();
+  }
+  output_->release();
+  reading.seconds = runTimeClock() - began;
+  return reading;
+}
+
+/// Adds what depends on other model runs, and on more than the files.
+EvaluationResult ModelRunner::complete(int slot, RunReading reading) {
+  slots_.at(static_cast<std::size_t>(slot - 1)).ended.reset();
+  EvaluationResult result = std::move(reading.result);
+  if (result.ok()) {
+    lastReadings_ = {lastReadings_[1], reading.seconds};
+    result.aggregate = aggregator_.aggregate(result.objectiveValues);  // which may have been settled meanwhile
+  }
   if (!result.ok()) result.failure->lastOutput = launcher_.lastOutput(slot, kEvidenceLines);
-  if (mayBeCutOff) result.lastOutput = launcher_.lastOutput(slot, kEvidenceLines);
+  if (reading.mayBeCutOff) result.lastOutput = launcher_.lastOutput(slot, kEvidenceLines);
   for (std::string& line : sharedTargets_.takeChanged()) result.warnings.push_back(std::move(line));
   for (std::string& line : sharedTargets_.takeHardLinked(launcher_.getProcessFolder(slot), needs_.outputs)) {
     result.warnings.push_back(std::move(line));
   }
   for (std::string& line : launcher_.takeWarnings()) result.warnings.push_back(std::move(line));
   // A result that may turn out to be cut off must not keep others from being shown.
-  if (result.ok() && description_.hasShownSeries && (mayBeCutOff || shownRuns_.mayBeShown(slot, result.aggregate))) {
-    result.shownSeries = output_->readShownSeries();
-  }
-  output_->release();
+  const bool isShown = result.ok() && description_.hasShownSeries &&
+                       (reading.mayBeCutOff || shownRuns_.mayBeShown(slot, result.aggregate));
+  if (!isShown) result.shownSeries = {};
   return result;
 }
 

@@ -1,7 +1,10 @@
 #pragma once
 
+#include <array>
 #include <cstdint>
 #include <functional>
+#include <limits>
+#include <memory>
 #include <optional>
 #include <span>
 #include <string>
@@ -14,6 +17,7 @@
 #include "evaluation/known_results.h"
 #include "evaluation/model_description.h"
 #include "evaluation/output_reader.h"
+#include "evaluation/reading_process.h"
 #include "evaluation/saved_files.h"
 #include "evaluation/shown_runs.h"
 #include "parameters/parameter_model.h"
@@ -58,6 +62,16 @@ class ModelRunner final {
   /// ten times a second while files are read, and may throw to end it. Throws FatalError if the setup or the
   /// observations are at fault.
   EvaluationResult collect(int slot, std::function<void()> look = {});
+  /// The same, in a process of its own if that is worth it: empty while the files are read, or have to wait for others
+  /// that are; to be called again then, when one of readingSockets() is readable.
+  std::optional<EvaluationResult> collectBeside(int slot, const std::function<void()>& look);
+  std::vector<int> readingSockets() const;
+  bool isBeingRead(int slot) const { return slots_.at(static_cast<std::size_t>(slot - 1)).reading != nullptr; }
+  /// Ends the processes that read; their results are lost.
+  void endReading();
+  /// Results that take less time to be read are read in this process, as starting another one would take as long; 0:
+  /// none are.
+  void readBesideFrom(double seconds) { leastSecondsBeside_ = seconds; }
 
   /// Keeps the output files of the slot's run, which belongs to evaluation `number`; adds those that could
   /// not be kept to `result`, with warnings. To be called before the slot's next run.
@@ -87,14 +101,19 @@ class ModelRunner final {
   const std::vector<std::string>& warnings() const { return warnings_; }
 
  private:
+  /// A process that starts, takes memory and ends costs about what reading 12 MB of text does, 20 ms.
+  static constexpr double kLeastSecondsBeside = 0.05;
+
   /// Paths of one slot's copies of the model's files.
   struct SlotFiles {
     std::vector<std::string> parameterFiles;  ///< in the order of ModelDescription::parameterFiles
     OutputFiles output;
-    bool isUsed = false;     ///< a model has run in the folder
-    bool isCleared = false;  ///< it has no results of an earlier run, as has just been seen to
-    bool isRenewed = false;  ///< it was made anew, and no run has left it whole since
-    double started = 0.0;    ///< when the model run was, by runTimeClock() - readingSeconds_
+    bool isUsed = false;                      ///< a model has run in the folder
+    bool isCleared = false;                   ///< it has no results of an earlier run, as has just been seen to
+    bool isRenewed = false;                   ///< it was made anew, and no run has left it whole since
+    double started = 0.0;                     ///< when the model run was, by runTimeClock() - readingSeconds_
+    std::optional<double> ended;              ///< when its end was seen, likewise, until it is collected
+    std::unique_ptr<ReadingProcess> reading;  ///< its results, now
   };
 
   FolderNeeds folderNeeds(const LauncherSettings& settings) const;
@@ -108,7 +127,12 @@ class ModelRunner final {
   std::string belowBase(const std::string& file) const;
   std::string slotPath(const std::string& baseFile, int slot) const;
   void updateResistanceNumbers(const std::string& path);
-  EvaluationResult read(int slot);
+  RunReading read(int slot);
+  EvaluationResult complete(int slot, RunReading reading);
+  bool isWorthProcess() const;
+  bool mayStartReading(const SlotFiles& files) const;
+  bool startReading(int slot);
+  double secondsToRead(const SlotFiles& files) const;
   void beginReading(int slot, std::function<void()> look);
   std::optional<EvaluationFailure> findBatchFailure(int slot) const;
 
@@ -123,7 +147,11 @@ class ModelRunner final {
   std::vector<std::string> warnings_;
   std::optional<OutputReader> output_;  ///< once the templates have been read
   double maxSeconds_ = 0.0;             ///< of a model run; 0: no limit
-  double readingSeconds_ = 0.0;         ///< that the results of model runs have taken so far
+  double readingSeconds_ = 0.0;         ///< that the results of model runs have kept this process so far
+  /// Of the last two successful model runs, the seconds that reading took; one alone may have been held up.
+  std::array<double, 2> lastReadings_{std::numeric_limits<double>::infinity(), 0.0};
+  double lastStart_ = 0.0;  ///< seconds that starting a process that reads took
+  double leastSecondsBeside_ = kLeastSecondsBeside;
   SavedFiles savedFiles_;
   SharedTargets sharedTargets_;  ///< looked at again after the first model run
   ShownRuns shownRuns_;

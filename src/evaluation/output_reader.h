@@ -46,6 +46,8 @@ class OutputReader final {
   std::vector<PeriodSeries> readShownSeries();
   /// Closes the simulated series.
   void release() { series_.releaseSimulationFiles(); }
+  /// Ends a process that reads files for this one, if there is one.
+  void endHelper() { series_.endHelper(); }
   /// Limits how long files are read.
   ReadingWatch& watch() { return series_.watch(); }
 

@@ -8,12 +8,21 @@ void ShownRuns::begin(int slot, int number, std::vector<double> parameterValues)
   runs_[slot] = {number, std::move(parameterValues)};
 }
 
+bool ShownRuns::isShownAnyhow(const Run& run, double aggregate) const {
+  return std::isnan(aggregate) || aggregate <= best_ || run.number <= firstRuns_;
+}
+
+bool ShownRuns::wouldBeShown(int slot, double aggregate) const {
+  const Run& run = runs_.at(slot);
+  return initial_.wouldBeInitial(run.number, run.parameterValues) || isShownAnyhow(run, aggregate);
+}
+
 bool ShownRuns::mayBeShown(int slot, double aggregate) {
-  const Run& run = runs_[slot];
+  const Run& run = runs_.at(slot);
+  const bool isShown = isShownAnyhow(run, aggregate);
   const bool isInitial = initial_.consider(run.number, run.parameterValues);
-  const bool mayBeBest = std::isnan(aggregate) || aggregate <= best_;
   if (aggregate < best_) best_ = aggregate;
-  return isInitial || mayBeBest || run.number <= firstRuns_;
+  return isInitial || isShown;
 }
 
 }  // namespace mirevo

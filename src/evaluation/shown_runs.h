@@ -25,12 +25,17 @@ class ShownRuns final {
   /// process so far, or not worse than any before (of equals a search may take any). A run whose aggregate is not known
   /// yet (NaN) may become the best.
   bool mayBeShown(int slot, double aggregate);
+  /// Whether mayBeShown() would be true now; where it would not, it will not be later either.
+  bool wouldBeShown(int slot, double aggregate) const;
 
  private:
   struct Run {
     int number = 0;
     std::vector<double> parameterValues;
   };
+  /// Of the initial evaluation nothing is asked here.
+  bool isShownAnyhow(const Run& run, double aggregate) const;
+
   InitialChoice initial_;
   std::map<int, Run> runs_;  ///< by slot
   int firstRuns_ = 0;

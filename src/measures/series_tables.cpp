@@ -371,6 +371,10 @@ ReadingWatch& SeriesTables::watch() {
   return reading_->watch;
 }
 
+void SeriesTables::endHelper() {
+  reading_->netcdf.end();
+}
+
 void SeriesTables::releaseSimulationFiles() {
   simulations_.clear();
 }

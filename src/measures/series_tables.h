@@ -48,6 +48,8 @@ class SeriesTables final {
   std::vector<std::string> takeDoubts() { return std::exchange(newDoubts_, {}); }
   /// Limits how long files are read.
   ReadingWatch& watch();
+  /// Ends the process that reads files of some formats, if there is one.
+  void endHelper();
 
   const std::vector<std::string>& observationFileNames() const { return observationNames_; }
   /// A listing that several measures read in different ways is there several times.

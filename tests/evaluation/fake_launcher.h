@@ -4,6 +4,8 @@
 #include <cassert>
 #include <filesystem>
 #include <functional>
+#include <poll.h>
+#include <span>
 #include <string>
 #include <vector>
 
@@ -66,7 +68,15 @@ class FakeLauncher final : public ProcessLauncher {
   std::string leftBehind(int slot) const override { return at(slot).batch.leftBehind; }
   std::vector<std::string> lastOutput(int slot, int) const override { return at(slot).batch.output; }
 
-  void waitForChange(double seconds) override {
+  void waitForChange(double seconds, std::span<const int> readable = {}) override {
+    readersWaitedFor += static_cast<int>(readable.size());
+    if (!readable.empty()) {  // as if reading took no time
+      if (onWait) onWait();
+      std::vector<pollfd> readers;
+      for (const int descriptor : readable) readers.push_back({descriptor, POLLIN, 0});
+      ::poll(readers.data(), readers.size(), static_cast<int>(1000 * seconds));
+      return;
+    }
     longestWait = std::max(longestWait, seconds);
     double until = now + seconds;
     for (const Slot& slot : slots_) {
@@ -94,6 +104,7 @@ class FakeLauncher final : public ProcessLauncher {
   int halts = 0;
   int mostRunning = 0;
   double longestWait = 0.0;
+  int readersWaitedFor = 0;
   std::function<void()> onWait;
   std::string initialiseError;
   std::string renewError;  ///< of renewFolder(), which then fails

@@ -1,6 +1,7 @@
 #include "platform/processes/helper_process.h"
 
 #include <algorithm>
+#include <array>
 #include <cerrno>
 #include <charconv>
 #include <cmath>
@@ -34,11 +35,13 @@ std::vector<pid_t>& unreapedHelpers() {
   return helpers;
 }
 
-[[noreturn]] void runHelper(pid_t parent, int socket, void (*serve)(int)) {
+[[noreturn]] void runHelper(pid_t parent, int socket, const std::function<void(int)>& serve) {
   ::prctl(PR_SET_PDEATHSIG, SIGKILL);
   if (::getppid() != parent) ::_exit(0);
+  unreapedHelpers().clear();
   ::prctl(PR_SET_NAME, "mirevo_helper");
-  ::setsid();
+  // Without the terminal's signals, and yet in the program's session, with which it shares the processors.
+  ::setpgid(0, 0);
   for (int signal = 1; signal < NSIG; ++signal) ::signal(signal, SIG_DFL);
   for (const int signal : {SIGINT, SIGTERM, SIGHUP, SIGQUIT, SIGPIPE, SIGUSR1, SIGUSR2}) ::signal(signal, SIG_IGN);
   sigset_t none;
@@ -81,7 +84,7 @@ int reap(pid_t process) {
 
 // Without exec: the helper is there at once and needs no file. The program has no threads of its own; those of an MPI
 // library hold no lock that the helper needs, as the C library's are in order after a fork.
-bool HelperProcess::start(void (*serve)(int), std::string& reason) {
+bool HelperProcess::start(const std::function<void(int)>& serve, std::string& reason) {
   end();
   wasKilled_ = false;
   int sockets[2] = {-1, -1};
@@ -96,6 +99,7 @@ bool HelperProcess::start(void (*serve)(int), std::string& reason) {
   ::close(sockets[1]);
   if (process_ > 0) {
     unreapedHelpers().push_back(process_);
+    owner_ = parent;
     socket_ = sockets[0];
     ::fcntl(socket_, F_SETFL, O_NONBLOCK);
     return true;
@@ -110,15 +114,24 @@ bool isHelperProcess(pid_t process) {
   return std::find(unreapedHelpers().begin(), unreapedHelpers().end(), process) != unreapedHelpers().end();
 }
 
+/// Otherwise a copy made by a fork, whose socket is closed.
+bool HelperProcess::isOwn() const {
+  return process_ > 0 && owner_ == ::getpid();
+}
+
 bool HelperProcess::isRunning() const {
   char next = 0;
-  return process_ > 0 && ::recv(socket_, &next, 1, MSG_PEEK | MSG_DONTWAIT) != 0;
+  return isOwn() && ::recv(socket_, &next, 1, MSG_PEEK | MSG_DONTWAIT) != 0;
 }
 
 void HelperProcess::end() {
-  if (process_ <= 0) return;
-  ::kill(process_, SIGKILL);
-  endAndDescribe();
+  if (process_ <= 0) return;  // and how it ended is still asked for
+  if (isOwn()) {
+    ::kill(process_, SIGKILL);
+    endAndDescribe();
+  }
+  process_ = 0;
+  socket_ = -1;
   wasKilled_ = false;
 }
 
@@ -135,6 +148,20 @@ HelperProcess::Outcome HelperProcess::send(const void* bytes, std::size_t size, 
 
 HelperProcess::Outcome HelperProcess::receive(void* bytes, std::size_t size, ReadingWatch& watch) {
   return transfer(static_cast<char*>(bytes), size, false, watch);
+}
+
+HelperProcess::Outcome HelperProcess::receiveArrived(std::string& bytes) const {
+  std::array<char, 65536> part;
+  while (true) {
+    const ssize_t count = ::recv(socket_, part.data(), part.size(), MSG_DONTWAIT);
+    if (count > 0) {
+      bytes.append(part.data(), static_cast<std::size_t>(count));
+    } else if (count == 0 || (errno != EAGAIN && errno != EWOULDBLOCK && errno != EINTR)) {
+      return Outcome::ended;
+    } else if (errno != EINTR) {
+      return Outcome::done;
+    }
+  }
 }
 
 bool HelperProcess::hasAnswer() const {

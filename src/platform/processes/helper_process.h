@@ -2,6 +2,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <functional>
 #include <string>
 #include <sys/types.h>
 
@@ -11,7 +12,7 @@ class ReadingWatch;
 
 /// A child process of this program, forked as it is, for work that may hang, crash or take all memory. It has a socket
 /// to the program and no other file of it, prints nothing, ignores the signals of the terminal, and ends with the
-/// program, however that ends.
+/// program, however that ends. It may have helpers of its own, and has none of those of the program.
 class HelperProcess final {
  public:
   enum class Outcome { done, ended, over };
@@ -23,7 +24,7 @@ class HelperProcess final {
 
   /// Starts it: it runs `serve` with its end of the socket, and ends when that returns. False, with the system's
   /// reason, when that fails.
-  bool start(void (*serve)(int socket), std::string& reason);
+  bool start(const std::function<void(int socket)>& serve, std::string& reason);
   bool isRunning() const;
   /// Ends it (SIGKILL), whatever it does.
   void end();
@@ -38,11 +39,17 @@ class HelperProcess final {
   /// Both wait until all of the bytes are through, the process has ended, or the time of `watch` is over.
   Outcome send(const void* bytes, std::size_t size, ReadingWatch& watch);
   Outcome receive(void* bytes, std::size_t size, ReadingWatch& watch);
+  /// Adds what has arrived, without a wait; Outcome::ended when no more can come.
+  Outcome receiveArrived(std::string& bytes) const;
+  /// Becomes readable when something arrives, or the process ends.
+  int socket() const { return socket_; }
 
  private:
   Outcome transfer(char* bytes, std::size_t size, bool isSending, ReadingWatch& watch);
+  bool isOwn() const;
 
   pid_t process_ = 0;
+  pid_t owner_ = 0;  ///< the process that started it
   int socket_ = -1;
   bool wasKilled_ = false;
 };

@@ -481,9 +481,10 @@ std::vector<std::string> PosixProcessLauncher::lastOutput(int slot, int lineCoun
   return last;
 }
 
-void PosixProcessLauncher::waitForChange(double seconds) {
+void PosixProcessLauncher::waitForChange(double seconds, std::span<const int> readable) {
   std::vector<pollfd> watched;
-  bool isNeeded = false;
+  bool isNeeded = !readable.empty();
+  for (const int descriptor : readable) watched.push_back({descriptor, POLLIN, 0});
   for (const Slot& slot : slots_) {
     if (!isBusy(slot)) continue;
     isNeeded = true;

@@ -43,7 +43,7 @@ class PosixProcessLauncher final : public ProcessLauncher {
   std::string leftBehind(int slot) const override;
   std::vector<std::string> takeWarnings() override { return std::exchange(warnings_, {}); }
   std::vector<std::string> lastOutput(int slot, int lineCount) const override;
-  void waitForChange(double seconds) override;
+  void waitForChange(double seconds, std::span<const int> readable = {}) override;
   void excludeTime(double seconds) override;
   void haltProcesses() override;
   ResistanceUpdate r35UpdateResistanceNumbers(const std::string& fileName) override;

@@ -2,6 +2,7 @@
 
 #include <cstdint>
 #include <functional>
+#include <span>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -95,8 +96,9 @@ class ProcessLauncher {
   /// The last lines that the slot's last batch printed, at most `lineCount`.
   virtual std::vector<std::string> lastOutput(int slot, int lineCount) const = 0;
 
-  /// Waits until a running batch has changed its state, a signal arrives, or `seconds` have passed.
-  virtual void waitForChange(double seconds) = 0;
+  /// Waits until a running batch has changed its state, one of the descriptors has become readable, a signal arrives,
+  /// or `seconds` have passed. Returns at once if there is neither a batch nor a descriptor.
+  virtual void waitForChange(double seconds, std::span<const int> readable = {}) = 0;
   /// For so long the program has not looked at its batches: an item that ended meanwhile has kept the next one waiting,
   /// which does not count as time of the batch.
   virtual void excludeTime(double seconds) { static_cast<void>(seconds); }

@@ -36,6 +36,8 @@ class NetcdfReader final {
   /// closes it. Empty, with "file: why", when that fails. Once more if something else has killed the process.
   std::optional<Content> read(const std::string& path, std::span<const int> items, ReadingWatch& watch,
                               std::string& reason);
+  /// Ends the process; the next file starts another one.
+  void end() { helper_.end(); }
 
  private:
   std::optional<Content> readOnce(const std::string& path, std::span<const int> items, ReadingWatch& watch,

@@ -3,6 +3,8 @@
 #include <csignal>
 #include <memory>
 #include <new>
+#include <poll.h>
+#include <string>
 #include <tuple>
 #include <unistd.h>
 #include <vector>
@@ -82,6 +84,33 @@ TEST(HelperProcess, ManyBytesPassBothWays) {
   EXPECT_EQ(helper.send(sent.data(), sent.size(), watch), Outcome::done);
   EXPECT_EQ(helper.receive(received.data(), received.size(), watch), Outcome::done);
   EXPECT_EQ(received, sent);
+}
+
+TEST(HelperProcess, AnotherOneHasItsOwnAlone) {
+  HelperProcess first;
+  HelperProcess second;
+  std::string reason;
+  ASSERT_TRUE(first.start(sendBack, reason)) << reason;
+  const auto useFirst = [&](int socket) {
+    std::string answer = first.isRunning() ? "inherited" : "none";
+    first.end();
+    if (first.start(hang, reason) && first.isRunning()) answer += ", own";
+    first.end();
+    if (!first.isRunning()) answer += ", ended";
+    sendFromHelper(socket, answer.data(), answer.size());
+  };
+  ASSERT_TRUE(second.start(useFirst, reason)) << reason;
+  std::string answer;
+  while (second.receiveArrived(answer) == Outcome::done) {
+    pollfd poll{second.socket(), POLLIN, 0};
+    ::poll(&poll, 1, 1000);
+  }
+  EXPECT_EQ(answer, "none, own, ended");
+  ASSERT_TRUE(first.isRunning());
+  ReadingWatch watch;
+  std::vector<char> bytes(3'000'000);
+  EXPECT_EQ(first.send(bytes.data(), bytes.size(), watch), Outcome::done);
+  EXPECT_EQ(first.receive(bytes.data(), bytes.size(), watch), Outcome::done);
 }
 
 TEST(HelperProcess, ItsMemoryIsLimited) {
