@@ -49,32 +49,39 @@ mean_milliseconds() { # command...
   awk -v a="$start" -v b="$EPOCHREALTIME" 'BEGIN { printf "%.2f ms", (b - a) * 10 }'
 }
 
+# The process of a rank of this job, in one look at all processes. Models do not have the variable.
+rank_process() { # rank
+  local process
+  for process in $(grep -lz "^OMPI_COMM_WORLD_RANK=$1\$" /proc/[0-9]*/environ 2>/dev/null); do
+    process=${process//[!0-9]/}
+    [ "$(readlink "/proc/$process/cwd")" != "$work" ] || { echo "$process"; return; }
+  done
+}
+
+own_memory() { awk '/^RssAnon/ { print $2 / 1024 }' "/proc/$1/status" 2>/dev/null || true; } # process
+
 # Processor time of the master for one set, from its 20th row to its end, and memory of master and of a worker, in MB
 # (anonymous, as program and libraries are shared). Sampled until the job ends.
 cost_of_scale() { # workers, milliseconds of the model, sets
   write_setup "$3" "$2"
   rm -f basin*.dat
   job $(($1 + 1)) >/dev/null 2>&1 &
-  local job=$! master='' worker='' first='' last='' rows=0 first_rows=0 last_rows=0 first_time=0 last_time=0 memory=0 theirs=0 now
+  local job=$! master='' worker='' first='' last='' rows=0 first_rows=0 last_rows=0 first_time=0 last_time=0 memory=0 theirs=0 now stat
   while kill -0 $job 2>/dev/null; do
     if [ -z "$master" ] && [ -e basin.dat ]; then
-      for process in $(pgrep -x Mirevo); do
-        [ "$(readlink "/proc/$process/cwd")" = "$work" ] || continue
-        case $(tr '\0' '\n' <"/proc/$process/environ" | grep '^OMPI_COMM_WORLD_RANK=' || true) in
-          *=0) master=${master:-$process} ;;
-          *=1) worker=${worker:-$process} ;;
-        esac
-      done
+      master=$(rank_process 0)
+      worker=$(rank_process 1)
     fi
-    if [ -n "$master" ] && now=$(awk '{ print $14 + $15 }' "/proc/$master/stat" 2>/dev/null); then
+    if [ -n "$master" ] && read -r -a stat 2>/dev/null <"/proc/$master/stat"; then
       rows=$(grep -c OK basin.dat || true)
       if [ "$rows" -ge 20 ]; then
+        now=$((stat[13] + stat[14]))
         [ -n "$first" ] || { first=$now first_rows=$rows first_time=$EPOCHREALTIME; }
         if [ "$rows" -gt "$last_rows" ]; then last=$now last_rows=$rows last_time=$EPOCHREALTIME; fi
       fi
-      now=$(awk '/^RssAnon/ { print $2 / 1024 }' "/proc/$master/status" 2>/dev/null || true)
+      now=$(own_memory "$master")
       memory=${now:-$memory}
-      [ -z "$worker" ] || now=$(awk '/^RssAnon/ { print $2 / 1024 }' "/proc/$worker/status" 2>/dev/null || true)
+      [ -z "$worker" ] || now=$(own_memory "$worker")
       [ -z "$worker" ] || theirs=${now:-$theirs}
     fi
     sleep 0.1
