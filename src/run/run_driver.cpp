@@ -227,10 +227,9 @@ void RunDriver::logSetup() {
     state_.log.line(fmt::format("{} job: this master and {} workers, each of which runs one model at a time",
                                 state_.job->means(), workers));
     if (const int mostUsed = config_.mostAtOnce(); mostUsed < workers) {
-      state_.log.warning(
-          fmt::format("Only {} can be used by the evaluations of this run, once the initial sample is "
-                      "done",
-                      countText(static_cast<std::size_t>(mostUsed), "worker")));
+      state_.log.warning(fmt::format("Only {} can be used by the evaluations of this run{}",
+                                     countText(static_cast<std::size_t>(mostUsed), "worker"),
+                                     config_.task->mayHaveInitialSample() ? ", but for an initial sample" : ""));
     }
     if (config_.maxWorkerSilence > 0.0) {
       state_.log.line(fmt::format("The set of a worker that gives no sign of life for {:g} s goes to another one",

@@ -53,9 +53,10 @@ constexpr double kLeftSeconds = 2.0;
 constexpr double kLeftLookSeconds = 0.002;
 constexpr double kUnwatchedSeconds = 0.02;
 /// A batch system that ends a job sends the signal to all its processes, one after the other. Where the model has it
-/// first, the program waits this long for its own before it takes the end of the model for a failure, which a restart
-/// would keep.
-constexpr double kRequestSeconds = 0.5;
+/// first, the program waits so long for its own before it takes the end of the model for a failure, which a restart
+/// would keep: as long as the model ran, within these limits, as many runs may end like that for reasons of their own.
+constexpr double kLeastRequestSeconds = 0.1;
+constexpr double kMostRequestSeconds = 0.5;
 
 /// Whether the signal may have been meant for the whole job: a request to end or, after that, a kill.
 bool mayEndJob(int signal) {
@@ -399,17 +400,23 @@ void PosixProcessLauncher::finishItem(Slot& slot, int code, int status) {
                     fmt::format("{} was ended because it ran longer than {:g} seconds", name, maxSeconds_)};
   } else if (code != CLD_EXITED) {
     slot.failure = {BatchFailure::Kind::signal, status, fmt::format("{} {}", name, endedBySignal(status))};
-    if (mayEndJob(status)) slot.heldBack = clock_() + kRequestSeconds;
+    if (mayEndJob(status)) holdBack(slot);
   } else if (status != 0) {
     slot.failure = {
         BatchFailure::Kind::exitCode, status,
         fmt::format("{} exited with code {}{}", name, status, meaningOfCode(status, slot.commands[slot.item].file()))};
-    if (mayEndJob(status - 128)) slot.heldBack = clock_() + kRequestSeconds;  // as shells tell of it
+    if (mayEndJob(status - 128)) holdBack(slot);  // as shells tell of it
   } else if (slot.item + 1 < slot.commands.size()) {
     ++slot.item;
     slot.started = std::min(slot.started + slot.unseen, clock_());
     startItem(slot);
   }
+}
+
+/// Its end is not told for a while, see kMostRequestSeconds.
+void PosixProcessLauncher::holdBack(Slot& slot) {
+  const double now = clock_();
+  slot.heldBack = now + std::clamp(now - slot.started, kLeastRequestSeconds, kMostRequestSeconds);
 }
 
 /// Ends a batch that has run too long, without waiting for it: SIGTERM first, and SIGKILL after the grace time.

@@ -61,7 +61,7 @@ class PosixProcessLauncher final : public ProcessLauncher {
     double started = 0.0;                ///< when the batch began
     double unseen = 0.0;                 ///< seconds without a look at the batch, since the last one
     std::optional<double> overdue;       ///< when it was sent SIGTERM because it ran too long
-    std::optional<double> heldBack;      ///< until when its end is not told, see kRequestSeconds
+    std::optional<double> heldBack;      ///< until when its end is not told, see holdBack()
     int log = -1;  ///< open for the whole run, so that a model run that prints nothing creates no file
     BatchFailure failure;
   };
@@ -78,6 +78,7 @@ class PosixProcessLauncher final : public ProcessLauncher {
   bool renewLog(Slot& slot);
   void startItem(Slot& slot);
   void finishItem(Slot& slot, int code, int status);
+  void holdBack(Slot& slot);
   void endOverdue(Slot& slot);
   bool isBusy(const Slot& slot) const { return slot.group > 0 || slot.isEnding || slot.heldBack; }
   double secondsToLook(const Slot& slot) const;

@@ -81,12 +81,14 @@ void checkParameterFiles(const RunConfig& config, const SectionsRead& sections) 
       if (config.batchItems[b].batchFileName != file) continue;
       refuse("a batch file", sections.batchItems[b].location("BatchFileName") + ": BatchFileName");
     }
+    // Each is removed before a model run and read after it, whether a measure uses its numbers or not.
+    for (std::size_t further = 0; further < config.furtherMeasureFiles.size(); ++further) {
+      if (config.furtherMeasureFiles[further].fileName != file) continue;
+      refuse("an output-measure file", sections.furtherMeasureFiles[further].location("File_Name") + ": File_Name");
+    }
     for (const OutputMeasure& measure : config.measures) {
       if (measure.interfaceType == InterfaceType::measureFile && config.measureFile == file) {
         refuse("the output-measure file", sections.measureFile->location("File_Name") + ": File_Name");
-      }
-      if (measure.interfaceType == InterfaceType::measureFile && measure.measureFile == file) {
-        refuse("an output-measure file", "one of FURTHER_FILES");
       }
       if (measure.interfaceType != InterfaceType::timeSeries || measure.simulation.fileName != file) continue;
       refuse("the file of a simulated series",

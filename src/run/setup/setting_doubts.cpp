@@ -121,15 +121,20 @@ void warnOfMatching(const OutputMeasure& measure, const SetupSection& section) {
   }
 }
 
-/// Of a measure that the model computes itself.
+/// Of a measure that is a number of the model, or its weighted difference to an observed value.
 void warnOfModelsNumber(const OutputMeasure& measure, const SetupSection& section) {
-  constexpr std::string_view kReason = "has no effect with Interface_Type = 1: the model's number is taken as it is";
+  const std::string_view reason = measure.observedValue
+                                      ? "has no effect with Interface_Type = 1: the model's number is compared as it is"
+                                      : "has no effect with Interface_Type = 1: the model's number is taken as it is";
+  if (measure.observedValue && measure.weight == 0.0 && measure.weightAbove == 0.0) {
+    section.warn("Weight", "both weights are 0, the measure does not depend on the model");
+  }
   if (!statisticOf(measure.statisticType).key.code) {
-    section.warn("Statistic_Type", fmt::format("{}, and a search makes it small", kReason));
+    section.warn("Statistic_Type", fmt::format("{}, and a search makes it small", reason));
   }
   const auto warnOf = [&](std::span<const std::string_view> keywords) {
     for (const std::string_view keyword : keywords) {
-      if (section.isWritten(keyword)) section.warn(keyword, kReason);
+      if (section.isWritten(keyword)) section.warn(keyword, reason);
     }
   };
   warnOf(std::array<std::string_view, 3>{"Transformation", "Epsilon", "Box_Cox_Lambda"});
@@ -144,6 +149,7 @@ void warnOfMeasures(const RunConfig& config, const SectionsRead& sections) {
       warnOfModelsNumber(measure, sections.measures[i]);
       continue;
     }
+    if (measure.observedValue) sections.measures[i].warn("Observed_Value", "has no effect with Interface_Type = 0");
     warnOfStatistic(measure, sections.measures[i]);
     warnOfMatching(measure, sections.measures[i]);
     if (isSameFile(measure.simulation.fileName, measure.observation.fileName)) {
@@ -161,9 +167,10 @@ void warnOfMeasureFile(const RunConfig& config, const SectionsRead& sections) {
 /// Whether the value of an objective function becomes ever better the further a measure is below 0.
 bool rewardsTooLittle(const RunConfig& config, const ObjectiveFunction& objective, const OutputMeasure& measure) {
   if (config.aggregationMethod == AggregationMethod::zero || objective.functionType != FunctionType::sum ||
-      !(objective.weight > 0.0) || measure.interfaceType != InterfaceType::timeSeries) {
+      !(objective.weight > 0.0)) {
     return false;
   }
+  if (measure.interfaceType != InterfaceType::timeSeries) return measure.observedValue && measure.weight > 0.0;
   const Statistic& statistic = statisticOf(measure.statisticType);
   return statistic.best == Best::zero && statistic.inObjective(-1.0) < 0.0 && measure.weight > 0.0;
 }

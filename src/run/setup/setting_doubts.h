@@ -18,7 +18,8 @@ struct SectionsRead {
   std::vector<SetupSection> measures;
   std::vector<SetupSection> objectives;
   std::optional<SetupSection> measureFile;  ///< OUTPUT_MEASURE_FILE
-  std::optional<SetupSection> slots;        ///< SimultaneousSimulations
+  std::vector<SetupSection> furtherMeasureFiles;
+  std::optional<SetupSection> slots;  ///< SimultaneousSimulations
 };
 
 /// Warns of settings that are valid, each for itself, and of which it is certain that they cannot yield what is wanted

@@ -512,6 +512,7 @@ void SetupReader::readFurtherMeasureFiles(const SetupSection& section) {
                     }
                     validateInBaseFolder(file.fileName, config_.baseFolder, "File_Name", opened);
                     file.instructions = openInstructions(opened, file.instructionFile);
+                    sections_.furtherMeasureFiles.push_back(opened);
                   });
   if (config_.furtherMeasureFiles.empty()) return;
   if (!config_.instructions) {

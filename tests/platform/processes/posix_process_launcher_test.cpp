@@ -104,17 +104,29 @@ TEST_F(PosixProcessLauncherTest, EndsAreToldApart) {
 }
 
 /// What a batch system sends to all processes of a job may reach the model before the program.
-TEST_F(PosixProcessLauncherTest, AnEndThatMayBeThatOfTheWholeJobIsToldHalfASecondLater) {
+TEST_F(PosixProcessLauncherTest, AnEndThatMayBeThatOfTheWholeJobIsToldLater) {
+  struct Case {
+    const char* ending;
+    double runSeconds;
+    double heldSeconds;
+  };
   addItem("run.sh");
-  for (const char* ending : {"kill -TERM $$", "kill -KILL $$", "kill -HUP $$", "exit 143"}) {
-    folder_.write("base/run.sh", std::string("#!/bin/sh\n") + ending + "\n", 0755);
+  for (const auto& [ending, runSeconds, heldSeconds] : {Case{"kill -TERM $$", 100.0, 0.5},
+                                                        {"kill -KILL $$", 0.3, 0.3},
+                                                        {"kill -HUP $$", 0.01, 0.1},
+                                                        {"exit 143", 0.01, 0.1}}) {
+    folder_.write("base/run.sh", std::string("#!/bin/sh\nwhile ! [ -e ../go ]; do sleep 0.01; done\n") + ending + "\n",
+                  0755);
     initialise();
     launcher_.createProcesses(1);
+    now_ += runSeconds;
+    folder_.write("go", "");
     ASSERT_TRUE(waitUntil([&] { return isExecuting(1) && launcher_.failure(1).kind != Kind::none; })) << ending;
-    now_ += 0.4;
+    std::filesystem::remove(folder_ / "go");
+    now_ += heldSeconds - 0.05;
     launcher_.waitForChange(0.01);
     EXPECT_TRUE(isExecuting(1)) << ending;
-    now_ += 0.2;
+    now_ += 0.1;
     EXPECT_EQ(finish(1), BatchStatus::failed) << ending;
   }
 }
