@@ -112,7 +112,9 @@ void ParameterTemplate::takeLine(std::string_view line, int lineNumber, std::spa
     }
     pieces_.back() += line.substr(copied, open - copied);
     const auto width = static_cast<int>(characterCount(line.substr(open, close - open + 1)));
-    placeholders_.push_back({parameter, {width, isOfPest_ ? ValueForm::rounded : ValueForm::cut}, lineNumber});
+    const bool isWhole = parameters[parameter].transformationType == TransformationType::integer;
+    const ValueForm form = !isOfPest_ ? ValueForm::cut : isWhole ? ValueForm::whole : ValueForm::rounded;
+    placeholders_.push_back({parameter, {width, form}, lineNumber});
     pieces_.emplace_back();
     copied = close + 1;
   }

@@ -102,8 +102,12 @@ std::optional<std::string> roundedForm(double value, int digits, std::size_t wid
   return std::nullopt;
 }
 
-std::string formatRounded(double value, std::size_t width) {
+std::string formatRounded(double value, std::size_t width, bool isWhole) {
   std::optional<std::string> text;
+  if (std::isfinite(value) && isWhole && value == std::trunc(value)) {
+    text = fmt::format("{:.0f}", value + 0.0);  // no "-0"
+    if (text->size() > width) text.reset();
+  }
   if (std::isfinite(value)) {
     for (int digits = digitsOf(value); digits > 0 && !text; --digits) text = roundedForm(value, digits, width);
   }
@@ -121,7 +125,9 @@ std::string formatRounded(double value, std::size_t width) {
 std::string FormatValueForPlaceholder(double value, ValueField placeholder) {
   const int width = placeholder.width;
   if (width <= 0) return {};
-  if (placeholder.form == ValueForm::rounded) return formatRounded(value, static_cast<std::size_t>(width));
+  if (placeholder.form != ValueForm::cut) {
+    return formatRounded(value, static_cast<std::size_t>(width), placeholder.form == ValueForm::whole);
+  }
   std::string field(static_cast<std::size_t>(width), ' ');
   const int w = std::min(width, kMaximumValueWidth);
   const double upper = static_cast<double>(kPowersOfTen[w - 1] - 1.0F);

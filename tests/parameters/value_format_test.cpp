@@ -89,6 +89,15 @@ TEST(FormatValueForPlaceholder, RoundsToWhatTheWholeFieldHolds) {
   }
 }
 
+TEST(FormatValueForPlaceholder, WritesAnIntegerWithoutAPointIfThereIsRoom) {
+  const std::tuple<double, int, const char*> cases[] = {{12.0, 4, "  12"},   {-0.0, 3, "  0"},
+                                                        {-7.0, 2, "-7"},     {12.5, 6, "  12.5"},
+                                                        {1e15, 6, "1.E+15"}, {std::nan(""), 2, "* "}};
+  for (const auto& [value, width, expected] : cases) {
+    EXPECT_EQ(FormatValueForPlaceholder(value, {width, ValueForm::whole}), expected) << value;
+  }
+}
+
 TEST(FormatValueForPlaceholder, LosesNoMoreThanHalfOfTheLastDigit) {
   std::mt19937_64 random(7);
   std::uniform_real_distribution<double> exponents(-12.0, 12.0);
