@@ -10,7 +10,7 @@ inline constexpr int kMaximumValueWidth = 20;
 
 /// How a value is written into its field.
 enum class ValueForm {
-  cut,     ///< in the first 20 characters, digits that do not fit being cut off
+  cut,      ///< in the first 20 characters, digits that do not fit being cut off
   rounded,  ///< with as many digits as the whole field has room for, the last one rounded, always with a decimal point
   whole     ///< an integer without a decimal point, or as `rounded` where it is none or does not fit
 };
@@ -28,8 +28,8 @@ struct ValueField {
 
 /// The text of a value for a field. Returns exactly as many characters as that is wide, the number on the right: of the
 /// form `cut` on the right of the first min(width, 20) characters. There a value whose exponent needs three digits
-/// becomes "*" followed by blanks; so does in any form one that is not a number, and in the other forms one of which the
-/// field has no room for a digit.
+/// becomes "*" followed by blanks; so does in any form one that is not a number, and in the other forms one of which
+/// the field has no room for a digit.
 std::string FormatValueForPlaceholder(double value, ValueField field);
 
 /// Whether the text of a value in a field of the form `cut` is a number and not "*", which does not depend on the
