@@ -68,7 +68,9 @@ void LocalEvaluator::startNext(int slot) {
     auto failure = runner_.prepareModelRun(ledger_.set(*place), slot, ledger_.numberOf(*place));
     if (!failure) {
       ledger_.markInitiated(*place, runTimeClock());
-      slots_[static_cast<std::size_t>(slot - 1)].running.emplace().place = *place;
+      Running running;
+      running.place = *place;
+      slots_[static_cast<std::size_t>(slot - 1)].running = std::move(running);
       return;
     }
     ledger_.finish(*place, runner_.failedResult(std::move(*failure)));

@@ -63,21 +63,21 @@ class DatePattern final {
                                                             {"DD", date_field::kDay},    {"hh", date_field::kHour},
                                                             {"mm", date_field::kMinute}, {"ss", date_field::kSecond}};
     bool has[std::size(kFields)] = {};
-    for (std::string_view rest = text; !rest.empty();) {
+    for (std::size_t at = 0; at < text.size(); at += parts_.back().length) {
+      const std::string_view rest = text.substr(at);
+      const char next = text[at];
       const auto field = std::ranges::find_if(kFields, [&](const auto& one) { return rest.starts_with(one.first); });
       const auto index = static_cast<std::size_t>(field - std::begin(kFields));
       const bool isField = field != std::end(kFields);
       const bool isFault =
-          isField ? has[index]
-                  : isDigit(rest.front()) || std::string_view("YMDhms").find(rest.front()) != std::string_view::npos;
+          isField ? has[index] : isDigit(next) || std::string_view("YMDhms").find(next) != std::string_view::npos;
       if (isFault) {
         reason = fmt::format("expected each of YYYY, MM, DD, hh, mm and ss at most once, and no digits, found {}",
                              quotedForMessage(text));
         return false;
       }
       if (isField) has[index] = true;
-      parts_.push_back(isField ? Part{field->first.size(), field->second} : Part{1, -1, rest.front()});
-      rest.remove_prefix(parts_.back().length);
+      parts_.push_back(isField ? Part{field->first.size(), field->second} : Part{1, -1, next});
       length_ += parts_.back().length;
     }
     for (std::size_t i = 0; i + 1 < std::size(kFields); ++i) {
