@@ -4,6 +4,7 @@
 #include <array>
 #include <map>
 #include <memory>
+#include <optional>
 #include <string>
 #include <tuple>
 #include <utility>
@@ -49,38 +50,74 @@ constexpr std::array kWaysToMean = {isEqual, isEqualIgnoringCase, isEqualWithout
 class NamedFiles final {
  public:
   const TimeSeriesObject& open(const SeriesReference& reference) {
-    auto& file = files_[{std::string(trimTrailing(reference.fileName)), reference.form, reference.listing.get()}];
-    if (!file) file = openTimeSeries(reference);
-    return *file;
+    File& file = files_[{std::string(trimTrailing(reference.fileName)), reference.form, reference.listing.get()}];
+    if (file.fault) throw FatalError(*file.fault);
+    if (file.series) return *file.series;
+    try {
+      file.series = openTimeSeries(reference);
+    } catch (const FatalError& fault) {
+      file.fault = fault;
+      throw;
+    }
+    return *file.series;
   }
 
  private:
-  std::map<std::tuple<std::string, TextForm, const void*>, std::unique_ptr<TimeSeriesObject>> files_;
+  struct File {
+    std::unique_ptr<TimeSeriesObject> series;
+    std::optional<FatalError> fault;
+  };
+  std::map<std::tuple<std::string, TextForm, const void*>, File> files_;
 };
 
-void findWeighting(OutputMeasure& measure, NamedFiles& files) {
-  ObservationWeighting& weighting = measure.weighting;
-  using Named = std::tuple<const std::string&, std::int32_t&, const std::string&>;
-  for (const auto& [name, item, location] :
-       {Named{weighting.weightName, weighting.weightItem, weighting.weightLocation},
-        Named{weighting.errorName, weighting.errorItem, weighting.weightLocation},
-        Named{weighting.qualityName, weighting.qualityItem, weighting.qualityLocation}}) {
-    if (name.empty()) continue;
-    SeriesReference reference = measure.observation;
-    reference.itemName = name;
-    reference.hasItemNo = item != 0;
-    reference.itemNo = item;
-    reference.itemLocation = location;
-    item = itemNumber(files.open(reference), reference);
+/// Finds the numbers of the items of a measure.
+class ItemFinder final {
+ public:
+  explicit ItemFinder(UnknownItems unknown) : unknown_(unknown) {}
+
+  void find(OutputMeasure& measure) {
+    for (SeriesReference* const reference : {&measure.simulation, &measure.observation}) findItem(*reference);
+    if (measure.weighting.isUsed()) findWeighting(measure);
   }
-  for (const auto& [item, location] :
-       {std::pair{std::max(weighting.weightItem, weighting.errorItem), &weighting.weightLocation},
-        std::pair{weighting.qualityItem, &weighting.qualityLocation}}) {
-    if (item != measure.observation.itemNo) continue;
-    fatalError("Error: Weights of observations invalid for output measure " + measure.name,
-               fmt::format("{}expected another item than the observed one, item No. {}", *location, item));
+
+ private:
+  void findItem(SeriesReference& reference) {
+    if (reference.itemName.empty() || (reference.hasItemNo && unknown_ == UnknownItems::left)) return;
+    try {
+      reference.itemNo = itemNumber(files_.open(reference), reference);
+      reference.hasItemNo = true;
+    } catch (const FatalError&) {
+      if (unknown_ == UnknownItems::refused) throw;
+    }
   }
-}
+
+  void findWeighting(OutputMeasure& measure) {
+    ObservationWeighting& weighting = measure.weighting;
+    using Named = std::tuple<const std::string&, std::int32_t&, const std::string&>;
+    for (const auto& [name, item, location] :
+         {Named{weighting.weightName, weighting.weightItem, weighting.weightLocation},
+          Named{weighting.errorName, weighting.errorItem, weighting.weightLocation},
+          Named{weighting.qualityName, weighting.qualityItem, weighting.qualityLocation}}) {
+      SeriesReference reference = measure.observation;
+      reference.itemName = name;
+      reference.hasItemNo = item != 0;
+      reference.itemNo = item;
+      reference.itemLocation = location;
+      findItem(reference);
+      item = reference.itemNo;
+    }
+    for (const auto& [item, location] :
+         {std::pair{std::max(weighting.weightItem, weighting.errorItem), &weighting.weightLocation},
+          std::pair{weighting.qualityItem, &weighting.qualityLocation}}) {
+      if (item != measure.observation.itemNo || unknown_ == UnknownItems::left) continue;
+      fatalError("Error: Weights of observations invalid for output measure " + measure.name,
+                 fmt::format("{}expected another item than the observed one, item No. {}", *location, item));
+    }
+  }
+
+  UnknownItems unknown_;
+  NamedFiles files_;
+};
 
 }  // namespace
 
@@ -124,15 +161,11 @@ std::int32_t itemNumber(const TimeSeriesObject& series, const SeriesReference& r
                          reference.itemLocation, found.size(), numbers));
 }
 
-std::vector<OutputMeasure> withItemNumbers(std::span<const OutputMeasure> measures) {
+std::vector<OutputMeasure> withItemNumbers(std::span<const OutputMeasure> measures, UnknownItems unknown) {
   std::vector<OutputMeasure> numbered(measures.begin(), measures.end());
-  NamedFiles files;
+  ItemFinder finder(unknown);
   for (OutputMeasure& measure : numbered) {
-    if (measure.interfaceType != InterfaceType::timeSeries) continue;
-    for (SeriesReference* const reference : {&measure.simulation, &measure.observation}) {
-      if (!reference->itemName.empty()) reference->itemNo = itemNumber(files.open(*reference), *reference);
-    }
-    if (measure.weighting.isUsed()) findWeighting(measure, files);
+    if (measure.interfaceType == InterfaceType::timeSeries) finder.find(measure);
   }
   return numbered;
 }

@@ -22,8 +22,15 @@ std::vector<std::int32_t> itemsCalled(const TimeSeriesObject& series, std::strin
 /// location and the nearest name, if there is none or are several of this name, and if the number is that of another.
 std::int32_t itemNumber(const TimeSeriesObject& series, const SeriesReference& reference);
 
-/// The measures with the numbers of the items that they name, from files as they are now. Throws FatalError as
-/// itemNumber() and openTimeSeries() do.
-std::vector<OutputMeasure> withItemNumbers(std::span<const OutputMeasure> measures);
+/// What becomes of a measure that names an item which cannot be found.
+enum class UnknownItems {
+  refused,
+  left  ///< as they are, for an earlier run, whose files may have gone or changed
+};
+
+/// The measures with the numbers of the items that they name, which keep their names, from files as they are now.
+/// Throws FatalError, unless unknown items are left, as itemNumber() and openTimeSeries() do.
+std::vector<OutputMeasure> withItemNumbers(std::span<const OutputMeasure> measures,
+                                           UnknownItems unknown = UnknownItems::refused);
 
 }  // namespace mirevo

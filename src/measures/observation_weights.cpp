@@ -54,6 +54,12 @@ double weightOf(const ObservationWeighting& weighting, double value) {
   return isUsable ? value : kNaN;
 }
 
+/// By their numbers where both are known, as a name may be written in several ways.
+bool isSameItem(std::int32_t a, const std::string& nameOfA, std::int32_t b, const std::string& nameOfB) {
+  if (a != 0 && b != 0) return a == b;
+  return nameOfA == nameOfB && (!nameOfA.empty() || a == b);
+}
+
 /// Whether the observed item has a value, per step.
 std::vector<bool> observedSteps(TimeSeriesObject& observation, const OutputMeasure& measure) {
   requireItem(observation, measure.observation);
@@ -141,10 +147,11 @@ std::vector<int> ObservationWeighting::items() const {
 
 bool ObservationWeighting::operator==(const ObservationWeighting& other) const {
   const auto meaning = [](const ObservationWeighting& w) {
-    return std::tie(w.weightItem, w.errorItem, w.qualityItem, w.weightName, w.errorName, w.qualityName, w.leftOut,
-                    w.downWeighted, w.qualityWeight);
+    return std::tie(w.leftOut, w.downWeighted, w.qualityWeight);
   };
-  return meaning(*this) == meaning(other);
+  return isSameItem(weightItem, weightName, other.weightItem, other.weightName) &&
+         isSameItem(errorItem, errorName, other.errorItem, other.errorName) &&
+         isSameItem(qualityItem, qualityName, other.qualityItem, other.qualityName) && meaning(*this) == meaning(other);
 }
 
 std::vector<double> stepWeights(TimeSeriesObject& observation, const OutputMeasure& measure) {

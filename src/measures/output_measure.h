@@ -52,7 +52,7 @@ struct SeriesReference {
   std::string fileLocation = {};
   std::string itemLocation = {};
   bool isDefaultItem = false;     ///< the setup does not say which item
-  bool hasItemNo = false;         ///< the setup has the number, which may be beside the name
+  bool hasItemNo = false;         ///< the number is known, which may be beside the name
   TextForm form = {};             ///< of a text file
   std::string formLocation = {};  ///< likewise, of the first keyword that tells the form
   ListingSettings listingSettings = {};

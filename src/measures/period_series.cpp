@@ -7,6 +7,7 @@
 #include "common/calendar.h"
 #include "measures/dates.h"
 #include "measures/measure_statistics.h"
+#include "platform/series/form_meaning.h"
 
 namespace mirevo {
 namespace {
@@ -42,9 +43,15 @@ PeriodSeries readSteps(TimeSeriesObject& series, const SeriesReference& referenc
   return read;
 }
 
-/// Whether the simulated series that is shown is the same, and the observed one but for observations that do not count.
-bool isMatchedAlike(const OutputMeasure& a, const OutputMeasure& b) {
-  return isSameItems(a, b) && a.timeMatch == b.timeMatch;
+/// By their numbers where both are known, as a name may be written in several ways.
+bool isSameItem(const SeriesReference& a, const SeriesReference& b) {
+  const auto isKnown = [](const SeriesReference& item) { return item.itemName.empty() || item.hasItemNo; };
+  return isKnown(a) && isKnown(b) ? a.itemNo == b.itemNo : a.itemName == b.itemName;
+}
+
+bool isSameSeries(const SeriesReference& a, const SeriesReference& b) {
+  return isSameItem(a, b) && a.fileName == b.fileName && a.listing == b.listing &&
+         isReadAlike(a.fileName, a.form, b.form);
 }
 
 std::vector<std::size_t> firstOfEach(std::span<const OutputMeasure> measures,
@@ -92,16 +99,16 @@ std::vector<float> valuesAt(const PeriodSeries& series, std::span<const std::int
 }
 
 bool isSameItems(const OutputMeasure& a, const OutputMeasure& b) {
-  const auto isSame = [](const SeriesReference& left, const SeriesReference& right) {
-    return left.fileName == right.fileName && left.form == right.form && left.itemNo == right.itemNo &&
-           left.itemName == right.itemName && left.listing == right.listing;
-  };
-  return isSame(a.simulation, b.simulation) && isSame(a.observation, b.observation);
+  return isSameSeries(a.simulation, b.simulation) && isSameSeries(a.observation, b.observation);
+}
+
+bool isMatchedAlike(const OutputMeasure& a, const OutputMeasure& b) {
+  return isSameItems(a, b) && a.timeMatch == b.timeMatch && hasSameMissingValues(a.simulation.form, b.simulation.form);
 }
 
 bool isSamePair(const OutputMeasure& a, const OutputMeasure& b) {
-  return isSameItems(a, b) && a.timeMatch == b.timeMatch && a.selection.isSameAs(b.selection) &&
-         a.weighting == b.weighting;
+  return isMatchedAlike(a, b) && a.selection.isSameAs(b.selection) && a.weighting == b.weighting &&
+         hasSameMissingValues(a.observation.form, b.observation.form);
 }
 
 std::vector<std::size_t> measuresOfDistinctPairs(std::span<const OutputMeasure> measures) {

@@ -34,9 +34,12 @@ PeriodSeries readPeriodObservations(TimeSeriesObject& series, const OutputMeasur
 std::vector<float> valuesAt(const PeriodSeries& series, std::span<const std::int64_t> seconds,
                             double largestGap = kAnyGap);
 
-/// Whether two measures compare the same items of the same files.
+/// Whether two measures compare the same items of the same files. An item whose number is not known is the same as one
+/// of the same name.
 bool isSameItems(const OutputMeasure& a, const OutputMeasure& b);
-/// Whether they also do so in the same way, with the same observations and weights.
+/// Whether the simulated series that is shown is the same, and the observed one but for observations that do not count.
+bool isMatchedAlike(const OutputMeasure& a, const OutputMeasure& b);
+/// Whether they also do so with the same observations and weights.
 bool isSamePair(const OutputMeasure& a, const OutputMeasure& b);
 
 /// Of more pairs than these, those of the same items are shown once, whatever observations of them the measures count:

@@ -12,6 +12,7 @@
 #include "common/run_files.h"
 #include "common/text.h"
 #include "common/version.h"
+#include "measures/item_names.h"
 #include "platform/terminal/front_end.h"
 #include "report/library_versions.h"
 #include "report/run_report.h"
@@ -37,7 +38,8 @@ command line is refused.
 
 int makeReport(const std::string& setupFileName) {
   RunLog unread;  // the run's own log is not touched
-  const RunConfig config = readSetupFile(setupFileName, unread);
+  RunConfig config = readSetupFile(setupFileName, unread);
+  config.measures = withItemNumbers(config.measures, UnknownItems::left);
   const std::string filePrefix = config.setupFolder + "/" + config.setupName;
   std::string reason;
   // The run may be making its report, and others this one.

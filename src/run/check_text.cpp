@@ -4,6 +4,7 @@
 #include <cmath>
 #include <cstddef>
 #include <cstdint>
+#include <optional>
 #include <string_view>
 
 #include <fmt/core.h>
@@ -39,13 +40,13 @@ std::string spanText(const PeriodSeries& series, const EvaluationPeriod& period)
                      at(found.back()));
 }
 
-/// "simulated 0.5, observed 0.42 at 2002-01-01 00:00"
-std::string pairAt(std::int64_t second, const PeriodSeries& simulated, const PeriodSeries& observed, double gap) {
+/// "simulated 0.5, observed 0.42 at 2002-01-01 00:00"; without observations the simulated value alone.
+std::string pairAt(std::int64_t second, const PeriodSeries& simulated, const PeriodSeries* observed, double gap) {
   const auto value = [second](const PeriodSeries& series, double largestGap) {
     return valuesAt(series, std::span(&second, 1), largestGap).front();
   };
-  return fmt::format("simulated {:.6g}, observed {:.6g} at {}", value(simulated, gap), value(observed, kAnyGap),
-                     dateOf(second));
+  const std::string other = observed != nullptr ? fmt::format(", observed {:.6g}", value(*observed, kAnyGap)) : "";
+  return fmt::format("simulated {:.6g}{} at {}", value(simulated, gap), other, dateOf(second));
 }
 
 class Lines final {
@@ -83,18 +84,30 @@ class Lines final {
            name.empty() ? "" : fmt::format(", {}", name));
       return;
     }
-    const auto shown = std::find_if(run_.shown.begin(), run_.shown.end(), [&](std::size_t other) {
-      return isSameItems(run_.config.measures[other], measure);
-    });
-    if (shown != run_.shown.end()) addSeries(index, static_cast<std::size_t>(shown - run_.shown.begin()));
+    addSeries(index);
   }
 
-  void addSeries(std::size_t index, std::size_t place) {
+  /// The place of the series that `isIts` says are those of the measure.
+  template <class IsIts>
+  std::optional<std::size_t> placeOf(const IsIts& isIts) const {
+    const auto shown = std::find_if(run_.shown.begin(), run_.shown.end(), isIts);
+    if (shown == run_.shown.end()) return std::nullopt;
+    return static_cast<std::size_t>(shown - run_.shown.begin());
+  }
+
+  void addSeries(std::size_t index) {
+    const std::vector<OutputMeasure>& measures = run_.config.measures;
+    auto place = placeOf([&](std::size_t other) { return other == index; });
+    if (!place) place = placeOf([&](std::size_t other) { return isSamePair(measures[other], measures[index]); });
+    const bool hasOwn = place.has_value();
+    // Of many pairs series are shared by measures that may count other observations.
+    if (!place) place = placeOf([&](std::size_t other) { return isMatchedAlike(measures[other], measures[index]); });
+    if (!place) return;
     const MeasureSource& source = run_.sources[index];
-    const PeriodSeries& simulated = run_.result.shownSeries.at(place);
-    const PeriodSeries& observed = run_.observations[place];
+    const PeriodSeries& simulated = run_.result.shownSeries.at(*place);
+    const PeriodSeries* const observed = hasOwn ? &run_.observations[*place] : nullptr;
     line("   simulated: {}: {}", source.simulated, spanText(simulated, period_));
-    line("   observed: {}: {}", source.observed, spanText(observed, period_));
+    line("   observed: {}{}", source.observed, observed != nullptr ? ": " + spanText(*observed, period_) : "");
     const auto& all = run_.result.pairs;
     const auto pairs =
         std::find_if(all.begin(), all.end(), [index](const MeasurePairs& each) { return each.measure == index; });

@@ -20,6 +20,7 @@
 #include "common/version.h"
 #include "evaluation/local_evaluator.h"
 #include "evaluation/ranks/rank_evaluator.h"
+#include "measures/item_names.h"
 #include "platform/processes/child_guard.h"
 #include "platform/processes/posix_process_launcher.h"
 #include "platform/processes/process_folder.h"
@@ -199,6 +200,7 @@ void RunDriver::buildModel() {
     state_.progress.writeMessage("Simulation cancelled");
     return true;
   };
+  config_.measures = withItemNumbers(config_.measures);
   runner_ = std::make_unique<ModelRunner>(describeModel(config_), *parameters_, *aggregator_, *launcher_, settings);
   results_->requireSameTimes(config_, runner_->output().observedSeries());
 }

@@ -10,7 +10,6 @@
 
 #include "common/run_files.h"
 #include "common/text.h"
-#include "measures/item_names.h"
 #include "run/setup/setup_warnings.h"
 
 namespace mirevo {
@@ -19,7 +18,7 @@ ModelDescription describeModel(const RunConfig& config) {
   model.baseFolder = config.baseFolder;
   model.fileTag = config.setupName;
   model.parameterFiles = config.parameterFiles;
-  model.measures = withItemNumbers(config.measures);
+  model.measures = config.measures;
   if (config.readsMeasureFile()) model.measureFile = config.measureFile;
   model.instructions = config.instructions;
   if (config.readsMeasureFile()) model.furtherMeasureFiles = config.furtherMeasureFiles;

@@ -10,7 +10,7 @@
 
 namespace mirevo {
 
-/// The description of the model in the setup.
+/// The description of the model in the setup, whose measures have the numbers of their items (withItemNumbers()).
 ModelDescription describeModel(const RunConfig& config);
 
 /// The launcher's settings for `slotCount` slots, whose process folders are numbered from `firstFolderNumber` on.

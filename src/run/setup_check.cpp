@@ -14,6 +14,7 @@
 #include "common/run_files.h"
 #include "common/text.h"
 #include "evaluation/local_evaluator.h"
+#include "measures/item_names.h"
 #include "platform/processes/child_guard.h"
 #include "platform/processes/folder_tree.h"
 #include "platform/processes/posix_process_launcher.h"
@@ -78,6 +79,7 @@ void SetupCheck::runModel() {
   if (config_.task) config_.task->requireSets(parameters.searchSpace(), parameters.feasibility());
   PosixProcessLauncher launcher;
   signalState.haltProcesses = haltProcessesFromSignal;
+  config_.measures = withItemNumbers(config_.measures);
   ModelDescription model = describeModel(config_);
   model.runsAtOnce = 1;
   model.hasShownSeries = true;

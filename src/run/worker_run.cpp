@@ -13,6 +13,7 @@
 #include "common/fatal_error.h"
 #include "common/run_files.h"
 #include "evaluation/ranks/rank_worker.h"
+#include "measures/item_names.h"
 #include "parameters/parameter_model.h"
 #include "platform/processes/child_guard.h"
 #include "platform/processes/posix_process_launcher.h"
@@ -39,11 +40,12 @@ void work(Job& job, std::optional<MasterWatch>& watch) {
     job.abort(1);
   });
   RunLog unread;  // discarded: the master's log has all of it
-  const RunConfig config = readSetup(begin->setupFile, begin->text, unread, true);
+  RunConfig config = readSetup(begin->setupFile, begin->text, unread, true);
   ParameterModel parameters(config.parameters, config.constraints);
   ObjectiveAggregator aggregator(config.objectives, config.aggregationMethod);
   PosixProcessLauncher launcher;
   signalState.haltProcesses = haltProcessesFromSignal;
+  config.measures = withItemNumbers(config.measures);
   ModelDescription model = describeModel(config);
   model.runsAtOnce = job.processCount() - 1;  // they may share a disk
   LauncherSettings settings = launcherSettings(config, 1, job.rank());

@@ -89,6 +89,19 @@ class ModelFolder : public TemporaryFolder {
     write("basin.kdx", text.replace(at, from.size(), to));
   }
 
+  /// Adds to `basin.kdx` a second measure, like the first one but for its name and with `keywords`.
+  void addMeasure(const std::string& name, const std::string& keywords) const {
+    const std::string text = read("basin.kdx");
+    const std::string end = "[/MEASURE_1]\n";
+    const std::size_t begin = text.find("[MEASURE_1]");
+    const std::size_t behind = text.find(end) + end.size();
+    std::string added = text.substr(begin, behind - begin);
+    for (const auto at : {added.rfind('1'), added.find('1')}) added[at] = '2';
+    added.replace(added.find("'flow'"), 6, fmt::format("'{}'\n{}", name, keywords));
+    write("basin.kdx", text.substr(0, behind) + added + text.substr(behind));
+    editSetup("[OUTPUT_MEASURES]\n      TqSEKdxListItemCount = 1", "[OUTPUT_MEASURES]\n      TqSEKdxListItemCount = 2");
+  }
+
  private:
   /// tests/integration/basin.kdx, where the fields stand in braces by their names here.
   static std::string setupText(const RunSettings& settings) {

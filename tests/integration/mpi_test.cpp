@@ -51,13 +51,24 @@ TEST_F(Mpi, AJobWritesTheResultsOfAPlainRun) {
   };
   folder_.useScript(fmt::format("{}\n{}", kSleepByParameters, kCountsJobVariables));
   std::filesystem::create_directory(folder_ / "scratch");  // a plain run would warn that it is missing
+  // Behind another item, so that workers must find the one that is named.
+  std::string observed = folder_.read("observed.csv");
+  for (auto comma = observed.find(','); comma != std::string::npos; comma = observed.find(',', comma + 5)) {
+    observed.insert(comma, comma < observed.find('\n') ? ",bed" : ",0.5");
+  }
+  folder_.write("observed.csv", observed);
+  const auto nameItem = [this] {
+    folder_.editSetup("'observed.csv'\n          Item_No = 1", "'observed.csv'\nItem_Name = 'simulated'");
+  };
   for (auto [settings, processes] : cases) {
     const std::string setup = folder_.writeSetup(settings);
+    nameItem();
     const ProgramResult alone = runProgram({setup});
     ASSERT_EQ(alone.exitCode, 0) << log();
     const std::string plain = folder_.read(settings.resultFile());
     settings.slots = 3;  // which counts for nothing in a job
     folder_.writeSetup(settings);
+    nameItem();
     const std::string series = folder_.read("basin_Series.dat");
     const ProgramResult job = runJob(processes, {setup});
     EXPECT_EQ(job.exitCode, 0) << job.error << log();

@@ -22,6 +22,22 @@ ProgramResult makeReport(const ModelFolder& folder, const std::string& setup = "
   return RunningProgram({folder / setup}, {}, MIREVO_REPORT).wait();
 }
 
+TEST(Report, OfItemsByTheirNamesIsMadeWhetherTheirFilesAreThere) {
+  const ModelFolder folder;
+  const std::string setup = folder.writeSetup({.option = 0});
+  folder.addMeasure("again", "");
+  folder.editSetup("'model/simulated.csv'\n          Item_No = 1", "'model/simulated.csv'\nItem_Name = 'simulated'");
+  ASSERT_EQ(runProgram({setup}).exitCode, 0);
+  const std::string ofRun = reportData(folder);
+  EXPECT_THAT(ofRun, HasSubstr(R"("measure":"flow, again")"));
+  EXPECT_EQ(makeReport(folder).exitCode, 0);
+  EXPECT_THAT(reportData(folder), HasSubstr(R"("measure":"flow, again")"));
+  std::filesystem::remove(folder / "model/simulated.csv");
+  const ProgramResult later = makeReport(folder);
+  EXPECT_EQ(later.exitCode, 0) << later.error;
+  EXPECT_THAT(reportData(folder), HasSubstr(R"("measure":"flow")"));
+}
+
 TEST(Report, StandsBesideTheResultsHoweverARunEnds) {
   const std::tuple<RunSettings, int, std::vector<const char*>> cases[] = {
       {{.maxEvaluations = 30},

@@ -1,6 +1,7 @@
 #include <filesystem>
 #include <map>
 #include <signal.h>
+#include <tuple>
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -55,6 +56,29 @@ TEST(SetupCheck, ShowsWhatWasReadWhateverTheTaskAndTouchesNothing) {
                 HasSubstr("Objective functions:\n   fit = "), HasSubstr("Nothing is wrong; no file of a run")));
       EXPECT_EQ(result.error, "");
     }
+  }
+}
+
+TEST(SetupCheck, ShowsEachMeasureItsOwnSeries) {
+  const std::tuple<const char*, const char*, const char*> cases[] = {
+      // keywords of the first and of the second measure on the same items, and what is shown of the second
+      {"", "Time_Offset = 24",
+       "365 values, the first 5 at 2001-01-01 00:00, the last 5.98261 at 2001-12-31 00:00\n   364 pairs, 1 observation "
+       "without a simulated value\n   first pair: simulated 4.01998, observed 5 at 2001-01-01 00:00\n"},
+      {"Months = 1", "",
+       ": 365 values, the first 5 at 2001-01-01 00:00, the last 5.98261 at 2001-12-31 00:00\n   365 pairs"},
+      {"", "Months = 1", ": 31 values, the first 5 at 2001-01-01 00:00, the last "},
+  };
+  for (const auto& [first, second, shown] : cases) {
+    const ModelFolder folder;
+    const std::string setup = folder.writeSetup({.option = 0});
+    folder.addMeasure("again", second);
+    folder.editSetup("Weight_Above = 1.0", fmt::format("Weight_Above = 1.0\n{}", first));
+    const ProgramResult result = check(setup);
+    EXPECT_EQ(result.exitCode, 0) << result.error;
+    const std::size_t own = result.output.find("Output measure again");
+    ASSERT_NE(own, std::string::npos) << result.output;
+    EXPECT_THAT(result.output.substr(own), HasSubstr(shown));
   }
 }
 

@@ -60,6 +60,8 @@ TEST(ItemNames, ReferencesGetTheNumberOrAreRefused) {
     try {
       const auto numbered = withItemNumbers(std::span(&measure, 1));
       EXPECT_EQ(numbered[0].simulation.itemNo, number == 3 ? 3 : 2);
+      EXPECT_TRUE(numbered[0].simulation.hasItemNo);
+      EXPECT_EQ(numbered[0].simulation.itemName, name);
     } catch (const FatalError& error) {
       found = error.message() + "|" + error.detail();
     }
@@ -73,6 +75,23 @@ TEST(ItemNames, ReferencesGetTheNumberOrAreRefused) {
   weighed.weighting.errorName = "level";
   EXPECT_THAT([&] { withItemNumbers(std::span(&weighed, 1)); },
               Throws<FatalError>(Property(&FatalError::detail, HasSubstr("expected another item than the observed"))));
+}
+
+TEST(ItemNames, OfAnEarlierRunAreLeftWhereTheyAreNotFound) {
+  const TemporaryFolder folder;
+  folder.write("o.csv", "time,level,sd\n2001-01-01,2,4\n");
+  const OutputMeasure measure{
+      .name = "m",
+      .simulation = {.fileName = folder / "gone.csv", .itemNo = 1, .itemName = "level"},
+      .observation = {.fileName = folder / "o.csv", .itemNo = 1, .itemName = "Level"},
+      .weighting = {.errorName = "sd", .qualityName = "code", .leftOut = {5}},
+  };
+  EXPECT_THROW(withItemNumbers(std::span(&measure, 1)), FatalError);
+  const OutputMeasure found = withItemNumbers(std::span(&measure, 1), UnknownItems::left).front();
+  EXPECT_FALSE(found.simulation.hasItemNo);
+  EXPECT_TRUE(found.observation.hasItemNo);
+  EXPECT_EQ(found.weighting.errorItem, 2);
+  EXPECT_EQ(found.weighting.qualityItem, 0);
 }
 
 }  // namespace
