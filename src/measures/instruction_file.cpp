@@ -8,6 +8,7 @@
 
 #include <fmt/format.h>
 
+#include "common/number_border.h"
 #include "common/reading_watch.h"
 #include "common/take_text.h"
 #include "common/text.h"
@@ -32,40 +33,6 @@ bool separates(char c) {
 
 std::string shortQuoted(std::string_view text) {
   return quotedForMessage(text.substr(0, kLongestQuoted));
-}
-
-bool isDigit(char c) {
-  return c >= '0' && c <= '9';
-}
-bool isDigitOrPoint(char c) {
-  return isDigit(c) || c == '.';
-}
-bool isSign(char c) {
-  return c == '+' || c == '-';
-}
-bool isExponent(char c) {
-  return c == 'e' || c == 'E' || c == 'd' || c == 'D';
-}
-
-/// Whether a number goes on from the character before `at` to the one there: through its digits, or through its
-/// exponent. Its sign in front of its first digit does not count.
-bool isInsideNumber(std::string_view line, std::size_t at) {
-  if (at == 0 || at >= line.size()) return false;
-  const char left = line[at - 1];
-  const char right = line[at];
-  const auto isAt = [line](std::size_t place, auto is) { return place < line.size() && is(line[place]); };
-  if (isDigitOrPoint(left) && isDigitOrPoint(right)) return true;
-  if (isDigitOrPoint(left) && isExponent(right)) {
-    return isAt(at + 1, isDigit) || (isAt(at + 1, isSign) && isAt(at + 2, isDigit));
-  }
-  if (isExponent(left) && at > 1 && isDigitOrPoint(line[at - 2])) {
-    return isDigit(right) || (isSign(right) && isAt(at + 1, isDigit));
-  }
-  return isSign(left) && isDigit(right) && at > 2 && isExponent(line[at - 2]) && isDigitOrPoint(line[at - 3]);
-}
-/// The same with its sign.
-bool isInsideSigned(std::string_view line, std::size_t at) {
-  return isInsideNumber(line, at) || (at > 0 && at < line.size() && isSign(line[at - 1]) && isDigitOrPoint(line[at]));
 }
 
 }  // namespace

@@ -357,8 +357,8 @@ std::optional<std::string> SeriesTables::tryOpenSimulationFiles(std::span<const 
       releaseSimulationFiles();
       return unusable;
     }
-    // Whether columns cut a number depends on how long it is.
-    if (simulationFiles_[i].listing) {
+    // Whether columns cut a number depends on how long it is, and header rows may be lacking.
+    if (simulationFiles_[i].listing || simulationFiles_[i].form.isGiven) {
       const std::vector<std::string> doubts = series->doubts();
       for (; toldDoubts_[i] < doubts.size(); ++toldDoubts_[i]) newDoubts_.push_back(doubts[toldDoubts_[i]]);
     }

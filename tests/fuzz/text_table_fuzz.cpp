@@ -41,6 +41,7 @@ mirevo::TextForm formOf(std::string_view line) {
 void requireSame(mirevo::TimeSeriesObject& a, mirevo::TimeSeriesObject& b) {
   require(std::ranges::equal(a.times(), b.times()) && a.startTime() == b.startTime());
   require(a.itemCount() == b.itemCount());
+  require(a.doubts().size() == b.doubts().size());
   for (int item = 1; item <= std::min(a.itemCount(), 12); ++item) {
     require(a.itemName(item) == b.itemName(item));
     require(a.getData(item) == b.getData(item));

@@ -1,7 +1,6 @@
 #include "platform/series/csv_time_series.h"
 
 #include <algorithm>
-#include <array>
 #include <charconv>
 #include <cmath>
 #include <cstring>
@@ -17,8 +16,8 @@
 #include "common/text.h"
 #include "common/utf8.h"
 #include "platform/series/csv_cells.h"
-#include "platform/series/missing_marker.h"
 #include "platform/series/series_reading.h"
+#include "platform/series/text_doubts.h"
 #include "platform/series/text_layout.h"
 
 namespace mirevo {
@@ -27,7 +26,6 @@ namespace {
 constexpr std::ptrdiff_t kLongestLine = std::ptrdiff_t{1} << 26;
 constexpr std::size_t kRowsPerLook = 65536;  ///< at the clock
 constexpr std::size_t kMostItems = 1'000'000;
-constexpr std::size_t kMostDoubts = 10;  ///< of comments
 
 std::string_view viewOf(const char* begin, const char* end) {
   return {begin, static_cast<std::size_t>(end - begin)};
@@ -71,17 +69,6 @@ std::string hintOfDecimalComma(std::string_view text) {
   return isOfDigits && text.find(',') != std::string_view::npos ? "; numbers have a decimal point" : std::string{};
 }
 
-/// Whether a column with this heading seems to hold the time of day: "Hour", "HH:MM", "time (UTC)".
-bool isHeadingOfHours(std::string_view heading) {
-  constexpr std::array<std::string_view, 10> kHeadings = {"hour", "hours",     "hourofday", "hr",   "hrs",
-                                                          "time", "timeofday", "hh",        "hhmm", "hhmmss"};
-  std::string letters;
-  for (const char c : heading.substr(0, heading.find_first_of("([{"))) {
-    if (c != ' ' && c != '_' && c != '-' && c != ':' && c != '.') letters += c;
-  }
-  return std::find(kHeadings.begin(), kHeadings.end(), toLowerAscii(letters)) != kHeadings.end();
-}
-
 }  // namespace
 
 bool CsvTimeSeries::open(const std::string& fileName) {
@@ -115,9 +102,7 @@ bool CsvTimeSeries::parse(std::string sourceName, std::string content) {
 void CsvTimeSeries::clear() {
   content_.clear();
   lastError_.clear();
-  deleteValue_ = std::numeric_limits<float>::quiet_NaN();
-  markLine_ = 0;
-  markDoubts_.clear();
+  marks_ = {};
   items_.clear();
   times_.clear();
   cells_.clear();
@@ -141,31 +126,10 @@ bool CsvTimeSeries::readPreamble(std::size_t& position) {
 }
 
 bool CsvTimeSeries::readMissingMark(std::string_view line, std::size_t number) {
-  const auto mark = missingMark(line.substr(1));
-  if (!mark) {  // a comment about other things, perhaps
-    if (const std::string_view marker = numberMeantAsMissing(line); !marker.empty()) {
-      markDoubts_.push_back(
-          {fmt::format("{}:{}: this comment marks no missing values; if {} is one, the line must be \"# missing = {}\"",
-                       sourceName_, number, marker, marker),
-           csv::parseCell(marker.data(), marker.data() + marker.size())});
-    }
-    return true;
-  }
-  const std::string_view text = *mark;
-  const std::optional<float> value = csv::parseCell(text.data(), text.data() + text.size());
-  if (!value || text.empty()) {
-    const char* const at = text.empty() ? line.data() + line.size() : text.data();
-    return fail(at, "a number after \"# missing =\"", quotedForMessage(text));
-  }
-  if (markLine_ != 0 && *value != deleteValue_ && !(std::isnan(*value) && std::isnan(deleteValue_))) {
-    markDoubts_.push_back(
-        {fmt::format("{}:{}: {} marks missing values, and no longer {}, as line {} says: only one value does",
-                     sourceName_, number, text, deleteValue_, markLine_),
-         std::nullopt});
-  }
-  deleteValue_ = *value;
-  markLine_ = number;
-  return true;
+  const auto wrong = marks_.read(line.substr(1), "#", number);
+  if (!wrong) return true;
+  const char* const at = wrong->empty() ? line.data() + line.size() : wrong->data();
+  return fail(at, "a number after \"# missing =\"", quotedForMessage(*wrong));
 }
 
 bool CsvTimeSeries::readHeader(std::string_view line) {
@@ -244,20 +208,8 @@ bool CsvTimeSeries::readRow(const char* line, const char* lineEnd, csv::DateScan
 }
 
 std::vector<std::string> CsvTimeSeries::doubts() const {
-  std::vector<std::string> doubts;
-  std::size_t count = 0;
-  for (const MarkDoubt& doubt : markDoubts_) {
-    if (doubt.marker != deleteValue_ && ++count <= kMostDoubts) doubts.push_back(doubt.text);
-  }
-  if (count > kMostDoubts) {
-    doubts.push_back(fmt::format("{}: {} more comments like these", sourceName_, count - kMostDoubts));
-  }
-  if (itemCount() < 2 || !isHeadingOfHours(itemName(1))) return doubts;
-  constexpr std::int64_t kDaySeconds = 86400;
-  const bool hasDatesOnly =
-      startSecond_ % kDaySeconds == 0 &&
-      std::all_of(times_.begin(), times_.end(), [](double days) { return days == std::floor(days); });
-  if (!hasDatesOnly) return doubts;
+  std::vector<std::string> doubts = marks_.doubts(sourceName_);
+  if (itemCount() < 2 || !isHeadingOfHours(itemName(1)) || !areDates(startSecond_, times_)) return doubts;
   doubts.push_back(fmt::format("{}: column 2 is called {} and is read as item No. 1, not as a part of the time; {}",
                                sourceName_, quotedForMessage(itemName(1)), kOneColumn));
   return doubts;

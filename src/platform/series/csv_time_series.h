@@ -1,7 +1,6 @@
 #pragma once
 
 #include <cstdint>
-#include <limits>
 #include <memory>
 #include <string>
 #include <string_view>
@@ -10,6 +9,7 @@
 
 #include "common/text.h"
 #include "platform/series/stored_time_series.h"
+#include "platform/series/text_doubts.h"
 
 namespace mirevo {
 
@@ -30,7 +30,7 @@ class CsvTimeSeries final : public StoredTimeSeries {
   bool parse(std::string sourceName, std::string content);
 
   /// The value of the `# missing =` comment, else NaN. Empty cells, NaN and NA become NaN.
-  std::optional<float> deleteValue() const override { return deleteValue_; }
+  std::optional<float> deleteValue() const override { return marks_.value(); }
   bool endsLine() const override { return mirevo::endsLine(content_); }
   /// A time of day in a column of its own, which would be the first item; comments that seem to mark missing values in
   /// another way, or a second time.
@@ -38,11 +38,6 @@ class CsvTimeSeries final : public StoredTimeSeries {
   std::string firstLines() const override;
 
  private:
-  struct MarkDoubt {
-    std::string text;
-    std::optional<float> marker;  ///< of a comment; no doubt if it is the value that marks missing ones
-  };
-
   bool readItem(std::size_t place) override;
   std::vector<double> readExactItem(std::size_t place) override;
   template <typename Value>
@@ -67,9 +62,7 @@ class CsvTimeSeries final : public StoredTimeSeries {
   std::string content_;
   char separator_ = ',';
   bool hasQuotes_ = false;  ///< in any row; without quotes a cell ends at the next separator
-  float deleteValue_ = std::numeric_limits<float>::quiet_NaN();
-  std::size_t markLine_ = 0;  ///< of the last `# missing =`, from 1; 0: none
-  std::vector<MarkDoubt> markDoubts_;
+  MissingMarks marks_;
   std::vector<std::size_t> cells_;  ///< one per row: where the cell of item cellsItem_ begins in the content
   int cellsItem_ = 1;               ///< moves with getData(), so that items read in order are found at once
 };

@@ -111,6 +111,12 @@ std::vector<std::string> timeColumns(const TextForm& form) {
 }
 
 std::optional<FormFault> findFault(const TextForm& form) {
+  if (const auto table = parseInteger(form.table); table && *table < 1) {
+    return FormFault{"Table",
+                     fmt::format("expected a table number of 1 or more, or the beginning of the line above the "
+                                 "table, found {}",
+                                 quotedForMessage(form.table))};
+  }
   if (auto fault = faultOfColumns(form)) return fault;
   return faultOfTime(form);
 }

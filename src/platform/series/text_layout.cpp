@@ -4,6 +4,7 @@
 
 #include <fmt/core.h>
 
+#include "common/number_border.h"
 #include "common/text.h"
 #include "common/utf8.h"
 #include "platform/series/csv_cells.h"
@@ -165,6 +166,18 @@ std::string_view TextLayout::behindColumns(std::string_view line) const {
   std::size_t at = 0;
   for (const double width : form_.columnWidths) at += widthInBytes(line, at, static_cast<std::size_t>(width));
   return trim(line.substr(at));
+}
+
+std::optional<TextLayout::Cut> TextLayout::findCut(std::string_view line, std::size_t first) const {
+  std::size_t at = 0;
+  std::size_t character = 1;
+  for (std::size_t column = 0; column + 1 < form_.columnWidths.size() && at < line.size(); ++column) {
+    const auto width = static_cast<std::size_t>(form_.columnWidths[column]);
+    at += widthInBytes(line, at, width);
+    character += width;
+    if (column >= first && isInsideSigned(line, at, form_.decimalSign.front())) return Cut{column, character};
+  }
+  return std::nullopt;
 }
 
 std::string TextLayout::separatorName() const {

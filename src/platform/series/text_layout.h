@@ -1,6 +1,8 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -38,6 +40,13 @@ class TextLayout final {
   bool split(std::string_view line, std::vector<std::string_view>& cells);
   /// The same for a text behind the last column of fixed width, which belongs to none.
   std::string_view behindColumns(std::string_view line) const;
+  /// Where columns of fixed width cut a number: the 0-based column that has its first part.
+  struct Cut {
+    std::size_t column = 0;
+    std::size_t character = 0;  ///< of the line, the first one of the next column, from 1
+  };
+  /// The first cut behind column `first` or one after it.
+  std::optional<Cut> findCut(std::string_view line, std::size_t first) const;
 
   /// Numbers of the lines that have the title of the table, so far; of a table with a number, how many began.
   const std::vector<std::size_t>& titleLines() const { return titleLines_; }

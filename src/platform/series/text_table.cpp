@@ -10,7 +10,6 @@
 #include "common/encoding.h"
 #include "common/files.h"
 #include "platform/series/csv_cells.h"
-#include "platform/series/missing_marker.h"
 #include "platform/series/series_reading.h"
 #include "platform/series/text_time.h"
 
@@ -63,9 +62,13 @@ void TextTable::clear() {
   rows_.clear();
   items_.clear();
   times_.clear();
-  headersRead_ = 0;
+  headers_.clear();
+  blankLine_ = 0;
   second_ = 0;
-  deleteValue_ = std::numeric_limits<float>::quiet_NaN();
+  numbersLine_ = 0;
+  cutCount_ = 0;
+  firstCut_.clear();
+  marks_ = {};
 }
 
 bool TextTable::read() {
@@ -89,9 +92,12 @@ bool TextTable::readLine(const TextLayout::Line& line, TimeReading& times) {
     case TextLayout::Kind::comment:
       return readComment(line);
     case TextLayout::Kind::header:
-      return readHeader(line);
+      return readHeader(line, times);
     case TextLayout::Kind::row:
       return readRow(line, times);
+    case TextLayout::Kind::blank:
+      if (blankLine_ == 0) blankLine_ = line.number;
+      return true;
     default:
       return true;
   }
@@ -128,25 +134,35 @@ bool TextTable::requireTable(std::size_t lastLine) {
 }
 
 bool TextTable::readComment(const TextLayout::Line& line) {
-  const std::size_t sign = form_.commentSign.empty() ? 1 : form_.commentSign.size();
-  const auto mark = missingMark(trim(trim(line.text).substr(sign)));
-  if (!mark || !rows_.empty()) return true;
-  const auto value = csv::parseCell(mark->data(), mark->data() + mark->size());
-  if (!value || mark->empty()) return fail(line.number, "a number after \"missing =\"", quotedForMessage(*mark));
-  deleteValue_ = *value;
-  return true;
+  if (!rows_.empty()) return true;
+  const std::string_view sign = form_.commentSign.empty() ? std::string_view("#") : form_.commentSign;
+  const auto wrong = marks_.read(trim(line.text).substr(sign.size()), sign, line.number);
+  return !wrong || fail(line.number, "a number after \"missing =\"", quotedForMessage(*wrong));
 }
 
-bool TextTable::readHeader(const TextLayout::Line& line) {
+bool TextTable::splitLine(const TextLayout::Line& line, std::string_view expected) {
   if (!layout_->split(line.text, cells_)) {
     return fail(line.number,
-                "a header row with columns separated by tab, semicolon or comma, unless Column_Separator or "
-                "Column_Widths tells otherwise",
+                fmt::format("{}columns separated by tab, semicolon or comma, unless Column_Separator or Column_Widths "
+                            "tells otherwise",
+                            expected),
                 quotedForMessage(line.text));
   }
+  if (form_.columnWidths.empty()) return true;
   if (const std::string_view rest = layout_->behindColumns(line.text); !rest.empty()) {
     return fail(line.number, "nothing behind the last of Column_Widths", quotedForMessage(rest));
   }
+  if (const std::size_t tab = trimTrailing(line.text).find('\t'); tab != std::string_view::npos) {
+    return fail(line.number,
+                "blanks between columns of fixed width (Column_Separator = 'blank' in place of Column_Widths takes "
+                "tabs, too)",
+                fmt::format("a tab behind {}", quotedForMessage(line.text.substr(0, tab))));
+  }
+  return true;
+}
+
+bool TextTable::readHeader(const TextLayout::Line& line, TimeReading& times) {
+  if (!splitLine(line, "a header row with ")) return false;
   if (cells_.size() > kMostColumns) {
     return fail(line.number, fmt::format("at most {} columns", kMostColumns), std::to_string(cells_.size()));
   }
@@ -167,8 +183,68 @@ bool TextTable::readHeader(const TextLayout::Line& line) {
       names_[i] += cells_[i];
     }
   }
-  ++headersRead_;
-  return headersRead_ < form_.headerRows || nameColumns(line.number);
+  headers_.push_back(line);
+  if (headers_.size() < static_cast<std::size_t>(form_.headerRows)) return true;
+  return nameColumns(line.number) && checkHeader(times);
+}
+
+bool TextTable::checkHeader(TimeReading& times) {
+  const bool hasNumbers = form_.timeUnit != TimeUnit::none;
+  std::string joined;
+  for (const TextLayout::Line& header : headers_) {
+    layout_->split(header.text, cells_);
+    cells_.resize(names_.size());
+    // A row of column numbers below the names.
+    std::size_t next = 0;
+    const bool isNumbering = headers_.size() > 1 && std::ranges::all_of(cells_, [&next](std::string_view cell) {
+                               return parseInteger(cell) == static_cast<std::int32_t>(++next);
+                             });
+    if (hasNumbers && isNumbering) continue;
+    const std::string_view time = timeText(joined);
+    if (!timeColumns_.empty() && times.read(time)) {
+      return fail(
+          header.number,
+          "a header row (Header_Rows tells how many there are, 0 if columns have no names, and Skip_Rows how many "
+          "lines are before them)",
+          "the time " + quotedForMessage(time));
+    }
+    const auto isNumber = [this](std::string_view cell) {
+      const auto number = withDecimalPoint(cell, form_.decimalSign.front());
+      return number && parseReal(*number);
+    };
+    if (timeColumns_.empty() && std::ranges::all_of(cells_, isNumber)) numbersLine_ = header.number;
+  }
+  return true;
+}
+
+bool TextTable::isTimeColumn(std::size_t column) const {
+  return std::find(timeColumns_.begin(), timeColumns_.end(), column) != timeColumns_.end();
+}
+
+std::string_view TextTable::timeText(std::string& joined) const {
+  if (timeColumns_.empty()) return {};
+  if (timeColumns_.size() == 1) return cells_[timeColumns_.front()];
+  joined.clear();
+  for (const std::size_t column : timeColumns_) {
+    if (!joined.empty()) joined += ' ';
+    joined += cells_[column];
+  }
+  return joined;
+}
+
+void TextTable::noteCut(const TextLayout::Line& line) {
+  // Parts of a time often follow one another without blanks.
+  auto cut = layout_->findCut(line.text, 0);
+  while (cut && isTimeColumn(cut->column) && isTimeColumn(cut->column + 1)) {
+    cut = layout_->findCut(line.text, cut->column + 1);
+  }
+  if (!cut || cutCount_++ > 0) return;
+  firstCut_ = fmt::format(
+      "{}:{}: Column_Widths ends column {} before character {}, between {} and {}: it cuts a number, unless these are "
+      "two "
+      "without a blank between them",
+      sourceName_, line.number, cut->column + 1, cut->character, quotedForMessage(cells_[cut->column]),
+      quotedForMessage(cells_[cut->column + 1]));
 }
 
 std::optional<std::size_t> TextTable::findColumn(const std::string& named, std::size_t line) {
@@ -201,13 +277,13 @@ bool TextTable::nameColumns(std::size_t line) {
   for (const std::string& named : mirevo::timeColumns(form_)) {
     const auto column = findColumn(named, line);
     if (!column) return false;
-    if (std::find(timeColumns_.begin(), timeColumns_.end(), *column) != timeColumns_.end()) {
+    if (isTimeColumn(*column)) {
       return fail(line, "each Time_Column once", fmt::format("column {} twice", *column + 1));
     }
     timeColumns_.push_back(*column);
   }
   for (std::size_t column = 0; column < names_.size(); ++column) {
-    if (std::find(timeColumns_.begin(), timeColumns_.end(), column) != timeColumns_.end()) continue;
+    if (isTimeColumn(column)) continue;
     itemColumns_.push_back(column);
     items_.push_back({names_[column]});
     items_.back().unit = splitUnit(names_[column]).second;
@@ -218,15 +294,7 @@ bool TextTable::nameColumns(std::size_t line) {
 
 bool TextTable::readRow(const TextLayout::Line& line, TimeReading& times) {
   const bool isFirst = names_.empty();
-  if (!layout_->split(line.text, cells_)) {
-    return fail(line.number,
-                "columns separated by tab, semicolon or comma, unless Column_Separator or Column_Widths tells "
-                "otherwise",
-                quotedForMessage(line.text));
-  }
-  if (const std::string_view rest = layout_->behindColumns(line.text); !rest.empty()) {
-    return fail(line.number, "nothing behind the last of Column_Widths", quotedForMessage(rest));
-  }
+  if (!splitLine(line, "")) return false;
   if (isFirst) {
     if (cells_.size() > kMostColumns) {
       return fail(line.number, fmt::format("at most {} columns", kMostColumns), std::to_string(cells_.size()));
@@ -240,16 +308,13 @@ bool TextTable::readRow(const TextLayout::Line& line, TimeReading& times) {
                             form_.headerRows == 0 ? "first" : "header"),
                 std::to_string(cells_.size()));
   }
-  std::string joined;
-  std::string_view text;
-  for (const std::size_t column : timeColumns_) {
-    if (timeColumns_.size() == 1) {
-      text = cells_[column];
-      break;
-    }
-    joined += fmt::format("{}{}", joined.empty() ? "" : " ", cells_[column]);
-    text = joined;
+  if (timeColumns_.empty() && !rows_.empty() && blankLine_ != 0) {
+    return fail(blankLine_, "no blank line between rows that are counted, as Time_Column = 'none' says",
+                fmt::format("one before the row in line {}", line.number));
   }
+  blankLine_ = 0;
+  std::string joined;
+  const std::string_view text = timeText(joined);
   const auto second = timeColumns_.empty() ? times.ofStep(static_cast<double>(rows_.size())) : times.read(text);
   if (!second) return fail(line.number, times.expected(), quotedForMessage(text));
   if (!rows_.empty() && *second <= second_) {
@@ -260,7 +325,35 @@ bool TextTable::readRow(const TextLayout::Line& line, TimeReading& times) {
   second_ = *second;
   times_.push_back(static_cast<double>(*second - startSecond_) / static_cast<double>(kSecondsOfDay));
   rows_.push_back({static_cast<std::size_t>(line.text.data() - content_.data()), line.number});
+  if (!form_.columnWidths.empty()) noteCut(line);
   return true;
+}
+
+std::vector<std::string> TextTable::doubts() const {
+  std::vector<std::string> doubts = marks_.doubts(sourceName_, form_.missingValues);
+  if (numbersLine_ != 0) {
+    doubts.push_back(
+        fmt::format("{}:{}: these numbers are read as names of the columns; if they are values, Header_Rows = "
+                    "0 or fewer Skip_Rows must say so",
+                    sourceName_, numbersLine_));
+  }
+  for (std::size_t place = 0; itemColumns_.size() > 1 && place < itemColumns_.size(); ++place) {
+    const std::size_t column = itemColumns_[place];
+    const bool isNextToTime = (column > 0 && isTimeColumn(column - 1)) || isTimeColumn(column + 1);
+    if (!isNextToTime || !isHeadingOfHours(names_[column]) || !areDates(startSecond_, times_)) continue;
+    const std::string_view format = form_.timeFormat.empty() ? "" : ", with hh in Time_Format,";
+    const std::string remedy =
+        form_.timeUnit == TimeUnit::none
+            ? fmt::format("; Time_Column = '{}, {}'{} takes it as one", form_.timeColumn, column + 1, format)
+            : "";
+    doubts.push_back(fmt::format("{}: column {} is called {} and is read as item No. {}, not as a part of the time{}",
+                                 sourceName_, column + 1, quotedForMessage(names_[column]), place + 1, remedy));
+  }
+  if (cutCount_ > 0) {
+    doubts.push_back(firstCut_ +
+                     (cutCount_ > 1 ? fmt::format("; so in {}", countText(cutCount_ - 1, "more row")) : ""));
+  }
+  return doubts;
 }
 
 std::optional<double> TextTable::valueOf(std::string_view cell) const {

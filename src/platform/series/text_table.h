@@ -1,7 +1,6 @@
 #pragma once
 
 #include <cstdint>
-#include <limits>
 #include <memory>
 #include <optional>
 #include <string>
@@ -11,6 +10,7 @@
 
 #include "common/text.h"
 #include "platform/series/stored_time_series.h"
+#include "platform/series/text_doubts.h"
 #include "platform/series/text_form.h"
 #include "platform/series/text_layout.h"
 
@@ -32,8 +32,10 @@ class TextTable final : public StoredTimeSeries {
   bool parse(std::string sourceName, std::string content);
 
   /// The value of the `# missing =` comment, else NaN.
-  std::optional<float> deleteValue() const override { return deleteValue_; }
+  std::optional<float> deleteValue() const override { return marks_.value(); }
   bool endsLine() const override { return mirevo::endsLine(content_); }
+  /// What the plain text reader doubts, columns that cut a number, and rows that are perhaps no header.
+  std::vector<std::string> doubts() const override;
   std::string firstLines() const override { return describeFirstLines(content_, form_); }
 
  private:
@@ -49,11 +51,18 @@ class TextTable final : public StoredTimeSeries {
   void clear();
   bool read();
   bool readLine(const TextLayout::Line& line, TimeReading& times);
+  bool splitLine(const TextLayout::Line& line, std::string_view expected);
   bool readComment(const TextLayout::Line& line);
-  bool readHeader(const TextLayout::Line& line);
+  bool readHeader(const TextLayout::Line& line, TimeReading& times);
   bool readRow(const TextLayout::Line& line, TimeReading& times);
   /// When all header rows are read, and of the first row if there are none.
   bool nameColumns(std::size_t line);
+  /// Refuses rows of values that were taken as header rows, as far as their times tell.
+  bool checkHeader(TimeReading& times);
+  /// The text of the time columns in cells_; `joined` is the room for that of several.
+  std::string_view timeText(std::string& joined) const;
+  bool isTimeColumn(std::size_t column) const;
+  void noteCut(const TextLayout::Line& line);
   /// The 0-based index of the column that `named` tells by number or name.
   std::optional<std::size_t> findColumn(const std::string& named, std::size_t line);
   bool requireTable(std::size_t lastLine);
@@ -76,9 +85,13 @@ class TextTable final : public StoredTimeSeries {
   std::vector<std::size_t> timeColumns_;  ///< 0-based
   std::vector<std::size_t> itemColumns_;
   std::vector<Row> rows_;
-  std::int32_t headersRead_ = 0;
-  std::int64_t second_ = 0;  ///< of the last row
-  float deleteValue_ = std::numeric_limits<float>::quiet_NaN();
+  std::vector<TextLayout::Line> headers_;
+  std::size_t blankLine_ = 0;    ///< number of the first one behind the last row; 0: none
+  std::int64_t second_ = 0;      ///< of the last row
+  std::size_t numbersLine_ = 0;  ///< number of a header row of numbers alone; 0: none
+  std::size_t cutCount_ = 0;     ///< rows with a number that is cut
+  std::string firstCut_;         ///< as a message
+  MissingMarks marks_;
 };
 
 }  // namespace mirevo

@@ -147,6 +147,26 @@ TEST(TextTable, RefusesWithThePlaceAndWhatWasExpected) {
       {{.table = "Flow"},
        "Flow\nt,q\n2000-01-01,1\n\nFlow\n",
        "5: expected one line that begins with \"Flow\", the title of the table, found a second one, after line 1"},
+      {TextForm(), "2000-01-01,1\n2000-01-02,2\n",
+       "1: expected a header row (Header_Rows tells how many there are, 0 if columns have no names, and Skip_Rows how "
+       "many lines are before them), found the time \"2000-01-01\""},
+      {{.headerRows = 2, .timeColumn = "2,1", .timeFormat = "DD.MM.YYYY hh:mm"},
+       "h;d;Q\n0:30;31.12.2000;1\n",
+       "2: expected a header row (Header_Rows tells how many there are, 0 if columns have no names, and Skip_Rows how "
+       "many lines are before them), found the time \"31.12.2000 0:30\""},
+      {{.timeColumn = "2", .timeUnit = TimeUnit::hours, .timeOrigin = DateRecord{2000, 1, 1}},
+       "1,2\n",
+       "1: expected a header row (Header_Rows tells how many there are, 0 if columns have no names, and Skip_Rows how "
+       "many lines are before them), found the time \"2\""},
+      {{.columnWidths = {10, 3}},
+       "time      Q\n2000-01-01\t1\n",
+       "2: expected blanks between columns of fixed width (Column_Separator = 'blank' in place of Column_Widths takes "
+       "tabs, too), found a tab behind \"2000-01-01\""},
+      {{.headerRows = 1, .timeColumn = "none", .timeUnit = TimeUnit::days, .timeOrigin = DateRecord{2000, 1, 1}},
+       "q,h\n\n1,2\n \n\n3,4\n",
+       "4: expected no blank line between rows that are counted, as Time_Column = 'none' says, found one before the "
+       "row "
+       "in line 6"},
       {{.commentSign = "!"}, "! missing = x\nt,q\n", "1: expected a number after \"missing =\", found \"x\""},
       {{.commentSign = "!"},
        "# 1\n2000-01-01,1\n",
@@ -171,6 +191,77 @@ TEST(TextTable, RefusesWithThePlaceAndWhatWasExpected) {
   EXPECT_TRUE(series.getData(2));
 }
 
+TEST(TextTable, DoubtsWhatSeemsToBeMeantInAnotherWay) {
+  const DateRecord origin{2000, 1, 1};
+  const TextForm usual;
+  const TextForm widths{.headerRows = 0, .columnWidths = {11, 5, 5}};
+  const TextForm counted{.timeColumn = "none", .timeUnit = TimeUnit::days, .timeOrigin = origin};
+  const std::string cut = "it cuts a number, unless these are two without a blank between them";
+  const std::tuple<TextForm, std::string, std::vector<std::string>> cases[] = {
+      // Numbers that columns cut, and those that only touch.
+      {widths,
+       "2000-01-01   1.5  2.5\n2000-01-02 1234512345\n2000-01-03 1234.5   1\n",
+       {":2: Column_Widths ends column 2 before character 17, between \"12345\" and \"12345\": " + cut +
+        "; so in 1 more row"}},
+      {widths, "2000-01-01  2E-1-1E+2\n", {}},
+      {widths,
+       "2000-01-01  2.5E-12.5\n",
+       {":1: Column_Widths ends column 2 before character 17, between \"2.5E\" and \"-12.5\": " + cut}},
+      {widths, "2000-01-01 1.234-5678\n2000-01-02 \xC3\xBC   1    2\n", {}},
+      {{.headerRows = 0, .decimalSign = ",", .columnWidths = {11, 5, 5}}, "2000-01-01  -1,5\n", {}},
+      {{.headerRows = 0, .decimalSign = ",", .columnWidths = {11, 5, 5}},
+       "2000-01-01    -11,5\n2000-01-02     1,5\n",
+       {":1: Column_Widths ends column 2 before character 17, between \"-1\" and \"1,5\": " + cut +
+        "; so in 1 more row"}},
+      {{.headerRows = 0, .columnWidths = {4, 2, 2, 5}, .timeColumn = "1,2,3", .timeFormat = "YYYY MM DD"},
+       "20000101    1\n",
+       {}},
+      {{.headerRows = 0, .columnWidths = {4, 2, 2, 5}, .timeColumn = "1,2,3", .timeFormat = "YYYY MM DD"},
+       "2000010112345\n",
+       {":1: Column_Widths ends column 3 before character 9, between \"01\" and \"12345\": " + cut}},
+      // The time of day in a column that is none of the time.
+      {usual,
+       "date,time,Q\n2000-01-01,12:00,1\n",
+       {": column 2 is called \"time\" and is read as item No. 1, not as a part of the time; Time_Column = '1, 2' "
+        "takes "
+        "it as one"}},
+      {{.timeColumn = "date", .timeFormat = "DD.MM.YYYY"},
+       "Q,hh:mm,date\n1,12:00,01.01.2000\n",
+       {": column 2 is called \"hh:mm\" and is read as item No. 2, not as a part of the time; Time_Column = 'date, 2', "
+        "with hh in Time_Format, takes it as one"}},
+      {usual, "date,hours\n2000-01-01,12\n", {}},
+      {usual, "date,hours,Q\n2000-01-01 06:00,12,1\n", {}},
+      {{.timeColumn = "1,2"}, "date,hour,Q\n2000-01-01,12:00,1\n", {}},
+      // Comments.
+      {usual,
+       "# missing: -999\nt,q\n2000-01-01,1\n",
+       {":1: this comment marks no missing values; if -999 is one, the line must be \"# missing = -999\""}},
+      {{.commentSign = "C"},
+       "C NODATA = -999\nt,q\n2000-01-01,1\nC missing: -7\n",
+       {":1: this comment marks no missing values; if -999 is one, the line must be \"C missing = -999\""}},
+      {{.missingValues = {-7, -99.9}}, "# missing: -99.9\nt,q\n2000-01-01,1\n", {}},
+      {usual,
+       "# missing = -9\n# missing = -99\nt,q\n2000-01-01,1\n",
+       {":2: -99 marks missing values, and no longer -9, as line 1 says: only one value does"}},
+      // Header rows of numbers: column numbers, or a row where the rows are counted.
+      {{.headerRows = 2, .timeUnit = TimeUnit::days, .timeOrigin = origin}, "t,q\n1,2\n1,5\n", {}},
+      {counted, "q,1001\n1,2\n", {}},
+      {counted,
+       "1.5,2\n1,2\n\n",
+       {":1: these numbers are read as names of the columns; if they are values, Header_Rows = 0 or fewer Skip_Rows "
+        "must say so"}},
+  };
+  for (const auto& [form, content, expected] : cases) {
+    SCOPED_TRACE(content);
+    ASSERT_FALSE(findFault(form)) << findFault(form)->explanation;
+    TextTable series(given(form));
+    ASSERT_TRUE(series.parse("s.txt", content)) << series.lastError();
+    std::vector<std::string> doubts;
+    for (const std::string& doubt : expected) doubts.push_back("s.txt" + doubt);
+    EXPECT_EQ(series.doubts(), doubts);
+  }
+}
+
 TEST(TextForm, ContradictionsAreFound) {
   const DateRecord origin{2000, 1, 1};
   const std::tuple<TextForm, const char*, const char*> cases[] = {
@@ -179,6 +270,8 @@ TEST(TextForm, ContradictionsAreFound) {
       {{.columnSeparator = "7"}, "Column_Separator", "found \"7\""},
       {{.columnSeparator = ",", .decimalSign = ","}, "Column_Separator", "another character than the Decimal_Sign"},
       {{.columnWidths = {3, 0.5}}, "Column_Widths", "whole numbers from 1 to 100000, found 0.5"},
+      {{.table = "0"}, "Table", "expected a table number of 1 or more, or the beginning"},
+      {{.table = " -1"}, "Table", "found \" -1\""},
       {{.headerRows = 0, .timeColumn = "1, date"}, "Time_Column", "Header_Rows = 0 and columns have no names"},
       {{.timeColumn = "1,,2"}, "Time_Column", "on either side of a comma"},
       {{.timeColumn = "none"}, "Time_Column", "expected Time_Unit, Time_Origin and Time_Step beside 'none'"},
