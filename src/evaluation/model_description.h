@@ -42,10 +42,11 @@ struct ModelDescription {
   SeriesPrecision keptPrecision = SeriesPrecision::single;
   std::optional<KeptSteps> keptSteps = {};  ///< they are kept at simulated steps, too
 
-  /// Whether instruction files read results.
-  bool readsListings() const {
-    return instructions || std::any_of(measures.begin(), measures.end(),
-                                       [](const OutputMeasure& measure) { return measure.simulation.listing; });
+  /// Whether the setup says how results are to be read, so that what they make doubtful is told, once.
+  bool saysHowToRead() const {
+    return instructions || std::any_of(measures.begin(), measures.end(), [](const OutputMeasure& measure) {
+             return measure.simulation.listing || measure.simulation.form.isGiven;
+           });
   }
 };
 

@@ -352,8 +352,8 @@ std::optional<EvaluationResult> ModelRunner::collectBeside(int slot, const std::
 
 bool ModelRunner::isWorthProcess() const {
   constexpr double kStarts = 4.0;
-  // What is told once of listings would be told by every process.
-  if (description_.readsListings()) return false;
+  // What is told once would be told by every process.
+  if (description_.saysHowToRead()) return false;
   const double expected = std::min(lastReadings_[0], lastReadings_[1]);
   return leastSecondsBeside_ <= 0.0 || expected >= std::max(leastSecondsBeside_, kStarts * lastStart_);
 }
