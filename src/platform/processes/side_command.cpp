@@ -150,6 +150,7 @@ class Watcher final {
   bool start(std::vector<std::string>& texts) {
     started_ = runTimeClock();
     stopped_.reset();
+    status_.reset();
     endedBy_ = Kind::exited;
     const Descriptor input(aboveStandard(::memfd_create("mirevo", MFD_CLOEXEC)));
     const Descriptor output(output_.open());
@@ -169,7 +170,8 @@ class Watcher final {
     for (std::size_t i = 3; i < texts.size(); ++i) environment.push_back(texts[i].data());
     environment.push_back(nullptr);
     const SpawnCommand command("/bin/sh", texts[1], {"-c", texts[0]});
-    const SpawnedProcess process = spawnProcess(command, {environment.data(), input.get(), output.get(), &entry_});
+    const SpawnedProcess process =
+        spawnProcess(command, {environment.data(), input.get(), output.get(), &entry_, ignored_});
     if (process.error != 0) return answer(Kind::couldNotStart, process.error);
     group_ = process.id;
     pidfd_ = process.pidfd;
@@ -185,21 +187,32 @@ class Watcher final {
 
   /// False when the program is gone.
   bool look() {
-    int status = 0;
     const double now = runTimeClock();
-    if (::waitpid(group_, &status, WNOHANG) != group_) {
+    if (!status_) {
+      int status = 0;
+      if (::waitpid(group_, &status, WNOHANG) == group_) status_ = status;
+    }
+    if (!status_) {
       if (!stopped_ && now - started_ > mostSeconds_) stop(Kind::timedOut);
       if (stopped_ && now - *stopped_ > graceSeconds_) ::kill(-group_, SIGKILL);
       return true;
     }
-    ::kill(-group_, SIGKILL);  // the rest of the group
     if (pidfd_ >= 0) ::close(pidfd_);
     pidfd_ = -1;
+    if (stopped_ && now - *stopped_ <= graceSeconds_ && hasGroup()) return true;
+    ::kill(-group_, SIGKILL);  // the rest of the group
     group_ = 0;
     endRest();
     if (endedBy_ != Kind::exited) return answer(endedBy_, 0);
-    if (WIFSIGNALED(status)) return answer(Kind::signalled, WTERMSIG(status));
-    return answer(Kind::exited, WEXITSTATUS(status));
+    if (WIFSIGNALED(*status_)) return answer(Kind::signalled, WTERMSIG(*status_));
+    return answer(Kind::exited, WEXITSTATUS(*status_));
+  }
+
+  /// Whether something of the group is left. SIGTERM ends a shell at once, and not what it runs, which has its time.
+  bool hasGroup() const {
+    while (::waitpid(-group_, nullptr, WNOHANG) > 0) {
+    }
+    return ::kill(-group_, 0) == 0;
   }
 
   /// Ends what has left the group: it has become a child of this process.
@@ -226,10 +239,12 @@ class Watcher final {
   std::atomic<pid_t> entry_{0};  ///< needed to start a process, and not used
   int pidfd_ = -1;
   OutputTail output_;
+  std::vector<int> ignored_ = ignoredSignals();  ///< by a helper process, and SIGTERM is to reach the command
   double started_ = 0.0;
   double mostSeconds_ = 0.0;
   double graceSeconds_ = 0.0;
   std::optional<double> stopped_;  ///< when it was sent SIGTERM
+  std::optional<int> status_;      ///< of the command's process, once it has ended
   Kind endedBy_ = Kind::exited;
 };
 

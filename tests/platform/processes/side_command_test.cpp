@@ -67,6 +67,16 @@ TEST_F(SideCommandTest, OneThatIgnoresSigtermIsKilledAfterItsGrace) {
   EXPECT_LT(result.seconds, 100.0);
 }
 
+TEST_F(SideCommandTest, SigtermReachesIt) {
+  folder_.write("script", "trap 'sleep 0.2; echo ended; exit 0' TERM; echo $$ >pid; while :; do sleep 0.05; done\n");
+  start("sh script; true");  // the shell before the script ends at once
+  EXPECT_TRUE(waitUntil([this] { return folder_.exists("pid"); }));
+  command_.stop(250.0);
+  const SideCommandEnd result = end();
+  EXPECT_THAT(result.output, HasSubstr("ended\n"));
+  EXPECT_LT(result.seconds, 100.0);
+}
+
 TEST_F(SideCommandTest, OneThatIsAbandonedIsEndedAllTheSame) {
   start("echo $$ >pid.part; mv pid.part pid; exec sleep 250");
   EXPECT_TRUE(waitUntil([this] { return folder_.exists("pid"); }));
