@@ -1,6 +1,7 @@
 #include "run/improvement_hook.h"
 
 #include <algorithm>
+#include <iterator>
 #include <set>
 #include <unistd.h>
 
@@ -13,7 +14,19 @@
 namespace mirevo {
 namespace {
 
-constexpr double kEarlySeconds = 10.0;  ///< longest time of the command at the end of a run that is not finished
+constexpr double kFailedSeconds = 10.0;  ///< longest time of the command at the end of a run that has failed
+constexpr double kCancelledSeconds = 2.0;
+/// The same of a job, which a kill file ends within five seconds. Its workers have two and a half to end their models,
+/// and the command has its time meanwhile.
+constexpr double kCancelledJobSeconds = 1.0;
+constexpr double kGraceSeconds = 2.0;  ///< from SIGTERM to SIGKILL
+constexpr double kUrgentGraceSeconds = 0.2;
+/// Longest wait for a command beyond its time: what waits for a lost network drive cannot be ended.
+constexpr double kLateSeconds = 5.0;
+constexpr double kLateJobSeconds = 0.5;
+constexpr std::size_t kMostVariableBytes = 100'000;
+constexpr std::string_view kParameterFront = "MIREVO_PARAMETER_";
+constexpr std::string_view kObjectiveFront = "MIREVO_OBJECTIVE_";
 constexpr int kMostFailuresShown = 20;
 constexpr unsigned kPauseMicroseconds = 5000;
 
@@ -27,15 +40,19 @@ std::string variableName(std::string_view name) {
   return text;
 }
 
-/// Of names that would be the same all but the first get a number.
+/// Of names that would be the same all but the first get a number. None, if all would take too much.
 void addVariables(std::string_view front, const HookValues::Named& values, std::vector<std::string>& variables) {
   std::set<std::string> used;
+  std::vector<std::string> added;
+  std::size_t size = 0;
   for (const auto& [name, value] : values) {
     const std::string stem = variableName(name);
     std::string unique = stem;
     for (int number = 2; !used.insert(unique).second; ++number) unique = fmt::format("{}_{}", stem, number);
-    variables.push_back(fmt::format("{}{}={}", front, unique, formatReal(value)));
+    added.push_back(fmt::format("{}{}={}", front, unique, formatReal(value)));
+    size += added.back().size() + 1;
   }
+  if (size <= kMostVariableBytes) std::move(added.begin(), added.end(), std::back_inserter(variables));
 }
 
 }  // namespace
@@ -53,8 +70,8 @@ std::vector<std::string> hookVariables(const RunConfig& config, std::string_view
       "MIREVO_VALUES=/dev/stdin",
   };
   if (!best) return variables;
-  addVariables("MIREVO_PARAMETER_", best->parameters, variables);
-  addVariables("MIREVO_OBJECTIVE_", best->objectives, variables);
+  addVariables(kParameterFront, best->parameters, variables);
+  addVariables(kObjectiveFront, best->objectives, variables);
   return variables;
 }
 
@@ -87,16 +104,27 @@ void ImprovementHook::look() {
   start("improvement", "running", next, config_.improvementCommandTime);
 }
 
-void ImprovementHook::finish(std::string_view state, const std::optional<HookValues>& best,
+void ImprovementHook::finish(std::string_view state, const std::optional<HookValues>& best, bool isOfJob,
                              const std::function<bool()>& isCancelled) {
-  const bool isFinished = state == "finished";
+  isOfJob_ = isOfJob;
   if (std::exchange(waiting_, std::nullopt)) ++skipped_;  // the end has the same set
-  if (!isFinished) command_.stop();
+  if (state != "finished") stop(state == "cancelled");
   awaitEnd(isCancelled);
-  const double limit = config_.improvementCommandTime;
-  start("end", state, best, isFinished ? limit : std::min(limit, kEarlySeconds));
-  // The kill file that has ended the run is still there.
-  awaitEnd(isFinished ? isCancelled : std::function<bool()>());
+  const bool isUrgent = state == "cancelled" || isCancelled();
+  if (isUrgent && isOfJob_ && state != "cancelled") {  // the wait for the workers may have taken the five seconds
+    log_.warning("The improvement command was not run at the end of the run, because of the kill file");
+    return tellOfAll();
+  }
+  double limit = config_.improvementCommandTime;
+  if (state == "failed") limit = std::min(limit, kFailedSeconds);
+  if (isUrgent) limit = std::min(limit, isOfJob_ ? kCancelledJobSeconds : kCancelledSeconds);
+  start("end", state, best, limit, isUrgent);
+  // A kill file that is there already leaves it its time.
+  awaitEnd(isUrgent ? std::function<bool()>() : isCancelled);
+  tellOfAll();
+}
+
+void ImprovementHook::tellOfAll() {
   log_.line(fmt::format("The improvement command was run {}, {} of them failed{}",
                         countText(static_cast<std::size_t>(starts_), "time"), failures_,
                         skipped_ == 0 ? std::string()
@@ -106,22 +134,49 @@ void ImprovementHook::finish(std::string_view state, const std::optional<HookVal
 }
 
 void ImprovementHook::start(std::string_view reason, std::string_view state, const std::optional<HookValues>& best,
-                            double mostSeconds) {
+                            double mostSeconds, bool isUrgent) {
   running_ = reason == "end" ? "at the end of the run" : fmt::format("for evaluation No. {}", best->number);
   mostSeconds_ = mostSeconds;
-  ++starts_;
+  const double grace = isUrgent ? kUrgentGraceSeconds : kGraceSeconds;
+  deadline_ = runTimeClock() + mostSeconds + grace + lateSeconds(isUrgent);
+  std::vector<std::string> variables = hookVariables(config_, reason, state, best);
+  if (++starts_ == 1 && best && !best->parameters.empty() &&
+      std::none_of(variables.begin(), variables.end(),
+                   [](const std::string& variable) { return variable.starts_with(kParameterFront); })) {
+    log_.line(fmt::format(
+        "The improvement command gets the parameters by its table alone, as {} variables would take more than {} kB",
+        best->parameters.size(), kMostVariableBytes / 1000));
+  }
   std::string reasonOfFailure;
   const SideCommandCall call{config_.improvementCommand, config_.setupFolder, hookTable(best),
-                             hookVariables(config_, reason, state, best), mostSeconds};
+                             std::move(variables),       mostSeconds,         grace};
   if (!command_.start(call, reasonOfFailure)) {
     fail(fmt::format("The improvement command {} could not be started: {}", running_, reasonOfFailure));
   }
 }
 
+double ImprovementHook::lateSeconds(bool isUrgent) const {
+  return isUrgent && isOfJob_ ? kLateJobSeconds : kLateSeconds;
+}
+
+void ImprovementHook::stop(bool isUrgent) {
+  const double grace = isUrgent ? kUrgentGraceSeconds : kGraceSeconds;
+  command_.stop(grace);
+  deadline_ = std::min(deadline_, runTimeClock() + grace + lateSeconds(isUrgent));
+}
+
 void ImprovementHook::awaitEnd(const std::function<bool()>& isCancelled) {
+  bool isStopped = false;
   while (command_.isRunning()) {
     if (const auto end = command_.take()) return tellOf(*end);
-    if (isCancelled && isCancelled()) command_.stop();
+    if (!isStopped && isCancelled && isCancelled()) {
+      isStopped = true;
+      stop(true);
+    }
+    if (runTimeClock() > deadline_) {
+      command_.abandon();
+      return fail(fmt::format("The improvement command {} does not end, and is not waited for any longer", running_));
+    }
     ::usleep(kPauseMicroseconds);
   }
 }
@@ -134,8 +189,9 @@ void ImprovementHook::tellOf(const SideCommandEnd& end) {
   fail(text);
 }
 
+/// Of a closed log a warning still comes to the user, a line does not.
 void ImprovementHook::fail(const std::string& text) {
-  if (++failures_ == 1) {
+  if (++failures_ == 1 || log_.isClosed()) {
     log_.warning(text);
   } else if (failures_ <= kMostFailuresShown) {
     log_.line(text);

@@ -36,15 +36,20 @@ class ImprovementHook final {
   /// To be called often: takes note of a command that has ended and starts the one that waits. Does not wait.
   void look();
   /// At the end of the run, "finished", "cancelled" or "failed": waits for the command that runs, if the run is
-  /// finished, otherwise ends it; then runs the command for the end and waits for it, if the run is not finished for
-  /// ten seconds at most. `isCancelled`: whether the command that is waited for is to be ended.
-  void finish(std::string_view state, const std::optional<HookValues>& best, const std::function<bool()>& isCancelled);
+  /// finished, otherwise ends it; then runs the command for the end and waits for it, after an error for ten seconds at
+  /// most, once there is a kill file for two. `isOfJob`: of several processes, where a cancelled run has one second for
+  /// it, and another that finds a kill file does not run it. `isCancelled`: whether there is a kill file.
+  void finish(std::string_view state, const std::optional<HookValues>& best, bool isOfJob,
+              const std::function<bool()>& isCancelled);
 
  private:
-  void start(std::string_view reason, std::string_view state, const std::optional<HookValues>& best,
-             double mostSeconds);
+  void start(std::string_view reason, std::string_view state, const std::optional<HookValues>& best, double mostSeconds,
+             bool isUrgent = false);
+  void stop(bool isUrgent);
   void awaitEnd(const std::function<bool()>& isCancelled);
+  double lateSeconds(bool isUrgent) const;
   void tellOf(const SideCommandEnd& end);
+  void tellOfAll();
   void fail(const std::string& text);
 
   const RunConfig& config_;
@@ -52,13 +57,16 @@ class ImprovementHook final {
   SideCommand command_;
   std::string running_;  ///< what it was started for
   double mostSeconds_ = 0.0;
+  double deadline_ = 0.0;  ///< of the wait for its end
+  bool isOfJob_ = false;
   std::optional<HookValues> waiting_;
   int starts_ = 0;
   int failures_ = 0;
   int skipped_ = 0;
 };
 
-/// What the command gets besides its input: its environment.
+/// What the command gets besides its input: its environment. The parameters are not in it if they would take more than
+/// 100 kB, nor are the objectives: systems start nothing with too large a one.
 std::vector<std::string> hookVariables(const RunConfig& config, std::string_view reason, std::string_view state,
                                        const std::optional<HookValues>& best);
 /// Its input: a table with the columns Kind, Name and Value.

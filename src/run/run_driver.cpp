@@ -306,7 +306,7 @@ void RunDriver::noteBestForHook() {
 
 void RunDriver::finishHook(std::string_view state) {
   if (!hook_) return;
-  hook_->finish(state, bestAtEnd_, [this] { return state_.progress.isCancelled(); });
+  hook_->finish(state, bestAtEnd_, state_.job->hasWorkers(), [this] { return state_.progress.isCancelled(); });
   hook_.reset();
 }
 
@@ -624,9 +624,11 @@ int RunDriver::endCancelled(std::string_view message) {
 }
 
 int RunDriver::endEarly(std::string_view ending, std::string_view state) {
-  signalState.runLogDescriptor = -1;
-  state_.log.close();
+  closeLog();
   if (launcher_) launcher_->haltProcesses();
+  // Of a cancelled job the workers end their models meanwhile, and their time goes on. After an error they may need far
+  // longer than the command has.
+  if (state == "cancelled") finishHook(state);
   leaveJob(state_, 1);
   finishHook(state);
   endProgress(ending);

@@ -136,6 +136,26 @@ TEST_F(Improvement, TheCommandEndsWithACancelledOrKilledRun) {
   }
 }
 
+/// The kill file ends the job within five seconds, on a machine that is not busy: the command does not count.
+TEST_F(Improvement, OfACancelledJobTheLastCommandHasASecond) {
+  if (!mpirunIsInstalled()) GTEST_SKIP() << "mpirun is not installed";
+  const std::string setup = setupWith(
+      "trap '' TERM\necho $MIREVO_REASON $MIREVO_STATE >>told\n"
+      "[ $MIREVO_REASON = end ] && while :; do sleep 0.1; done",
+      {.option = 3, .maxEvaluations = 1000});
+  folder_.useScript("sleep 0.1");
+  RunningProgram job = startJob(3, {setup});
+  EXPECT_TRUE(folder_.reaches("told", "improvement running"));
+  folder_.write("basin._kill_", "");
+  const ProgramResult result = job.wait(60.0);
+  EXPECT_FALSE(result.timedOut);
+  EXPECT_EQ(result.exitCode, 1);
+  EXPECT_THAT(folder_.read("told"), EndsWith("end cancelled\n"));
+  EXPECT_THAT(result.error, HasSubstr("at the end of the run was ended because it ran longer than 1 second after 1."));
+  EXPECT_THAT(result.error, Not(HasSubstr("are aborted")));
+  EXPECT_THAT(log(), EndsWith("EM: Simulation cancelled\n"));
+}
+
 TEST_F(Improvement, OfAJobTheMasterAloneRunsTheCommand) {
   if (!mpirunIsInstalled()) GTEST_SKIP() << "mpirun is not installed";
   const std::string setup = setupWith("echo $MIREVO_REASON >>told", {.option = 3, .maxEvaluations = 12});

@@ -135,6 +135,13 @@ void HelperProcess::end() {
   wasKilled_ = false;
 }
 
+void HelperProcess::leave() {
+  if (isOwn() && socket_ >= 0) ::close(socket_);
+  process_ = 0;
+  socket_ = -1;
+  wasKilled_ = false;
+}
+
 std::string HelperProcess::endAndDescribe() {
   if (socket_ >= 0) ::close(std::exchange(socket_, -1));
   const int status = reap(std::exchange(process_, 0));

@@ -28,6 +28,8 @@ class HelperProcess final {
   bool isRunning() const;
   /// Ends it (SIGKILL), whatever it does.
   void end();
+  /// Closes the socket and forgets the process, which ends by itself once it has noticed that.
+  void leave();
   /// After Outcome::ended, waits for its end: "was ended by signal 11 (Segmentation fault)".
   std::string endAndDescribe();
   /// After that: whether something else ended it with SIGKILL, which is no fault of its work. (A limit of its time ends

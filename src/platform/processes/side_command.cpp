@@ -15,6 +15,7 @@
 #include <sys/prctl.h>
 #include <sys/wait.h>
 #include <unistd.h>
+#include <utility>
 
 #include <fmt/core.h>
 
@@ -31,17 +32,18 @@ namespace {
 
 using Kind = SideCommandEnd::Kind;
 
-constexpr double kGraceSeconds = 2.0;
 /// Longest wait for what a command has left to be gone once it is killed.
 constexpr double kLeftSeconds = 2.0;
 constexpr double kMessageSeconds = 5.0;
+constexpr double kEndSeconds = 4.0;
 constexpr std::size_t kMostOutput = 2000;
 
 struct RequestHead {
   std::int32_t isStart = 0;  ///< otherwise: the command is to be ended
   double mostSeconds = 0.0;
-  std::uint64_t size =
-      0;  ///< of the parts that follow, each with a zero byte behind it: command, folder, input, variables
+  double graceSeconds = 0.0;
+  /// Of the parts that follow, each with a zero byte behind it: command, folder, input, variables.
+  std::uint64_t size = 0;
 };
 struct AnswerHead {
   Kind kind = Kind::lost;
@@ -55,13 +57,50 @@ void pause(double seconds) {
   ::nanosleep(&time, nullptr);
 }
 
-/// The descriptor of a file without a name, for a process that is to be started; -1 if there can be none.
-int unnamedFile() {
-  const int file = ::memfd_create("mirevo", MFD_CLOEXEC);
+/// The same file by a descriptor that a process can be started with; -1 if there can be none.
+int aboveStandard(int file) {
   if (file < 0 || file > STDERR_FILENO) return file;
   const Descriptor low(file);
   return ::fcntl(file, F_DUPFD_CLOEXEC, STDERR_FILENO + 1);
 }
+
+/// The end of what comes out of a pipe: nothing else of it is kept, however much a command prints.
+class OutputTail final {
+ public:
+  /// The end of a new pipe that the command is to write to; -1 if there can be none.
+  int open() {
+    text_.clear();
+    std::array<int, 2> ends{-1, -1};
+    if (::pipe2(ends.data(), O_CLOEXEC) != 0) return -1;
+    pipe_.emplace(ends[0]);
+    ::fcntl(ends[0], F_SETFL, O_NONBLOCK);
+    return aboveStandard(ends[1]);
+  }
+  /// -1 once nothing writes to it any more.
+  int descriptor() const { return pipe_ ? pipe_->get() : -1; }
+  /// Takes what is there, at most so much that time limits are kept however fast it is filled.
+  void drain() {
+    constexpr int kMostParts = 32;  // more than a pipe holds
+    std::array<char, 65536> part;
+    for (int i = 0; pipe_ && i < kMostParts; ++i) {
+      const ssize_t count = ::read(pipe_->get(), part.data(), part.size());
+      if (count < 0 && errno == EINTR) continue;
+      if (count < 0 && errno == EAGAIN) return;
+      if (count <= 0) return pipe_.reset();
+      text_.append(part.data(), static_cast<std::size_t>(count));
+      if (text_.size() > kMostOutput) text_.erase(0, text_.size() - kMostOutput);
+    }
+  }
+  std::string close() {
+    drain();
+    pipe_.reset();
+    return std::exchange(text_, {});
+  }
+
+ private:
+  std::optional<Descriptor> pipe_;
+  std::string text_;
+};
 
 /// The helper's side: one command after another.
 class Watcher final {
@@ -70,8 +109,10 @@ class Watcher final {
 
   void serve() {
     while (true) {
-      std::array<pollfd, 2> events{pollfd{socket_, POLLIN, 0}, pollfd{pidfd_, POLLIN, 0}};
+      std::array<pollfd, 3> events{pollfd{socket_, POLLIN, 0}, pollfd{pidfd_, POLLIN, 0},
+                                   pollfd{output_.descriptor(), POLLIN, 0}};
       ::poll(events.data(), events.size(), group_ == 0 ? -1 : milliseconds());
+      if (events[2].revents != 0) output_.drain();
       if (events[0].revents != 0 && !obey()) break;
       if (group_ != 0 && !look()) break;
     }
@@ -83,7 +124,7 @@ class Watcher final {
   /// Until the next look.
   int milliseconds() const {
     constexpr int kUnwatched = 20;
-    const double next = (stopped_ ? *stopped_ + kGraceSeconds : started_ + mostSeconds_) - runTimeClock();
+    const double next = (stopped_ ? *stopped_ + graceSeconds_ : started_ + mostSeconds_) - runTimeClock();
     const double limit = std::clamp(next, 0.0, 1000.0) * 1000.0 + 1.0;
     return pidfd_ >= 0 ? static_cast<int>(limit) : std::min(static_cast<int>(limit), kUnwatched);
   }
@@ -95,10 +136,12 @@ class Watcher final {
     std::string parts(head.size, '\0');
     if (!receiveInHelper(socket_, parts.data(), parts.size())) return false;
     if (head.isStart == 0) {
+      graceSeconds_ = std::min(graceSeconds_, head.graceSeconds);
       if (group_ != 0) stop(Kind::stopped);
       return true;
     }
     mostSeconds_ = head.mostSeconds;
+    graceSeconds_ = head.graceSeconds;
     std::vector<std::string> texts;
     for (std::size_t at = 0; at < parts.size(); at += texts.back().size() + 1) texts.emplace_back(parts.c_str() + at);
     return start(texts);
@@ -107,10 +150,11 @@ class Watcher final {
   bool start(std::vector<std::string>& texts) {
     started_ = runTimeClock();
     stopped_.reset();
+    status_.reset();
     endedBy_ = Kind::exited;
-    const Descriptor input(unnamedFile());
-    output_.emplace(unnamedFile());
-    if (input.get() < 0 || output_->get() < 0) return answer(Kind::couldNotStart, errno);
+    const Descriptor input(aboveStandard(::memfd_create("mirevo", MFD_CLOEXEC)));
+    const Descriptor output(output_.open());
+    if (input.get() < 0 || output.get() < 0) return answer(Kind::couldNotStart, errno);
     if (const int error = writeWhole(input.get(), texts[2]).error; error != 0)
       return answer(Kind::couldNotStart, error);
     ::lseek(input.get(), 0, SEEK_SET);
@@ -126,7 +170,8 @@ class Watcher final {
     for (std::size_t i = 3; i < texts.size(); ++i) environment.push_back(texts[i].data());
     environment.push_back(nullptr);
     const SpawnCommand command("/bin/sh", texts[1], {"-c", texts[0]});
-    const SpawnedProcess process = spawnProcess(command, {environment.data(), input.get(), output_->get(), &entry_});
+    const SpawnedProcess process =
+        spawnProcess(command, {environment.data(), input.get(), output.get(), &entry_, ignored_});
     if (process.error != 0) return answer(Kind::couldNotStart, process.error);
     group_ = process.id;
     pidfd_ = process.pidfd;
@@ -142,21 +187,32 @@ class Watcher final {
 
   /// False when the program is gone.
   bool look() {
-    int status = 0;
     const double now = runTimeClock();
-    if (::waitpid(group_, &status, WNOHANG) != group_) {
+    if (!status_) {
+      int status = 0;
+      if (::waitpid(group_, &status, WNOHANG) == group_) status_ = status;
+    }
+    if (!status_) {
       if (!stopped_ && now - started_ > mostSeconds_) stop(Kind::timedOut);
-      if (stopped_ && now - *stopped_ > kGraceSeconds) ::kill(-group_, SIGKILL);
+      if (stopped_ && now - *stopped_ > graceSeconds_) ::kill(-group_, SIGKILL);
       return true;
     }
-    ::kill(-group_, SIGKILL);  // the rest of the group
     if (pidfd_ >= 0) ::close(pidfd_);
     pidfd_ = -1;
+    if (stopped_ && now - *stopped_ <= graceSeconds_ && hasGroup()) return true;
+    ::kill(-group_, SIGKILL);  // the rest of the group
     group_ = 0;
     endRest();
     if (endedBy_ != Kind::exited) return answer(endedBy_, 0);
-    if (WIFSIGNALED(status)) return answer(Kind::signalled, WTERMSIG(status));
-    return answer(Kind::exited, WEXITSTATUS(status));
+    if (WIFSIGNALED(*status_)) return answer(Kind::signalled, WTERMSIG(*status_));
+    return answer(Kind::exited, WEXITSTATUS(*status_));
+  }
+
+  /// Whether something of the group is left. SIGTERM ends a shell at once, and not what it runs, which has its time.
+  bool hasGroup() const {
+    while (::waitpid(-group_, nullptr, WNOHANG) > 0) {
+    }
+    return ::kill(-group_, 0) == 0;
   }
 
   /// Ends what has left the group: it has become a child of this process.
@@ -173,16 +229,8 @@ class Watcher final {
   }
 
   bool answer(Kind kind, int code) {
-    const AnswerHead empty{kind, code, runTimeClock() - started_, 0};
-    std::string output;
-    if (const off_t size = output_->get() < 0 ? 0 : ::lseek(output_->get(), 0, SEEK_END); size > 0) {
-      output.resize(std::min(static_cast<std::size_t>(size), kMostOutput));
-      const ssize_t count = ::pread(output_->get(), output.data(), output.size(), size - std::ssize(output));
-      output.resize(static_cast<std::size_t>(std::max<ssize_t>(count, 0)));
-    }
-    output_.reset();
-    AnswerHead head = empty;
-    head.size = output.size();
+    const std::string output = output_.close();
+    const AnswerHead head{kind, code, runTimeClock() - started_, output.size()};
     return sendFromHelper(socket_, &head, sizeof head) && sendFromHelper(socket_, output.data(), output.size());
   }
 
@@ -190,10 +238,13 @@ class Watcher final {
   pid_t group_ = 0;              ///< also the command's process; 0: none runs
   std::atomic<pid_t> entry_{0};  ///< needed to start a process, and not used
   int pidfd_ = -1;
-  std::optional<Descriptor> output_;
+  OutputTail output_;
+  std::vector<int> ignored_ = ignoredSignals();  ///< by a helper process, and SIGTERM is to reach the command
   double started_ = 0.0;
   double mostSeconds_ = 0.0;
+  double graceSeconds_ = 0.0;
   std::optional<double> stopped_;  ///< when it was sent SIGTERM
+  std::optional<int> status_;      ///< of the command's process, once it has ended
   Kind endedBy_ = Kind::exited;
 };
 
@@ -213,7 +264,8 @@ std::string SideCommandEnd::text(double mostSeconds) const {
     case Kind::signalled:
       return endedBySignal(code);
     case Kind::timedOut:
-      return fmt::format("was ended because it ran longer than {:g} seconds", mostSeconds);
+      return fmt::format("was ended because it ran longer than {:g} second{}", mostSeconds,
+                         mostSeconds == 1.0 ? "" : "s");
     case Kind::stopped:
       return "was ended, as the run has ended";
     case Kind::couldNotStart:
@@ -227,7 +279,7 @@ std::string SideCommandEnd::text(double mostSeconds) const {
 SideCommand::~SideCommand() {
   if (!isRunning_) return;
   stop();
-  const double deadline = runTimeClock() + kGraceSeconds + kLeftSeconds;
+  const double deadline = runTimeClock() + kEndSeconds;
   while (!take() && runTimeClock() < deadline) pause(0.005);
 }
 
@@ -235,7 +287,7 @@ bool SideCommand::start(const SideCommandCall& call, std::string& reason) {
   if (!helper_.isRunning() && !helper_.start(watchCommands, reason)) return false;
   std::string parts = call.command + '\0' + call.folder + '\0' + call.input + '\0';
   for (const std::string& variable : call.variables) parts += variable + '\0';
-  const RequestHead head{1, call.mostSeconds, parts.size()};
+  const RequestHead head{1, call.mostSeconds, call.graceSeconds, parts.size()};
   ReadingWatch watch;
   watch.begin(kMessageSeconds, "its limit");
   if (helper_.send(&head, sizeof head, watch) != HelperProcess::Outcome::done ||
@@ -268,12 +320,17 @@ std::optional<SideCommandEnd> SideCommand::take() {
   return SideCommandEnd{};
 }
 
-void SideCommand::stop() {
+void SideCommand::stop(double graceSeconds) {
   if (!isRunning_) return;
-  const RequestHead head;
+  const RequestHead head{0, 0.0, graceSeconds, 0};
   ReadingWatch watch;
   watch.begin(kMessageSeconds, "its limit");
   helper_.send(&head, sizeof head, watch);
+}
+
+void SideCommand::abandon() {
+  isRunning_ = false;
+  helper_.leave();
 }
 
 }  // namespace mirevo

@@ -16,6 +16,7 @@ struct SideCommandCall {
   std::string input;                   ///< what it reads on standard input
   std::vector<std::string> variables;  ///< "NAME=value", in the place of those that it inherits
   double mostSeconds = 0.0;            ///< after which it is ended
+  double graceSeconds = 2.0;           ///< then, from SIGTERM to SIGKILL
 };
 
 /// How it came to its end.
@@ -24,7 +25,7 @@ struct SideCommandEnd {
   Kind kind = Kind::lost;
   std::int32_t code = 0;  ///< exit code, signal or error number
   double seconds = 0.0;   ///< that it took
-  std::string output;     ///< the end of what it printed
+  std::string output;     ///< the last that it printed, at most 2000 bytes
 
   bool isGood() const { return kind == Kind::exited && code == 0; }
   /// "exited with code 3", "was ended because it ran longer than 60 seconds"
@@ -47,8 +48,11 @@ class SideCommand final {
   bool isRunning() const { return isRunning_; }
   /// How it has ended, once; empty while it runs. Does not wait.
   std::optional<SideCommandEnd> take();
-  /// Ends it: SIGTERM, and SIGKILL two seconds later. take() then tells of it.
-  void stop();
+  /// Ends it: SIGTERM, and SIGKILL so much later. take() then tells of it.
+  void stop(double graceSeconds = 2.0);
+  /// Leaves it to its helper process, which goes on ending it, beyond the end of the program if need be: something that
+  /// waits for a lost network drive may never be gone.
+  void abandon();
 
  private:
   HelperProcess helper_;

@@ -40,7 +40,7 @@ bool RunLog::open(const std::string& path, std::string& reason) {
 
 void RunLog::close() {
   const int descriptor = std::exchange(descriptor_, -1);
-  isClosed_ = descriptor >= 0;
+  isClosed_ = isClosed_ || descriptor >= 0;
   if (descriptor < 0 || ::close(descriptor) == 0 || errno == EINTR) return;
   if (writeError_.empty()) writeError_ = std::strerror(errno);
 }

@@ -23,6 +23,8 @@ class RunLog final {
   /// the call come first.
   bool open(const std::string& path, std::string& reason);
   void close();
+  /// Whether it was open and is so no more: what is written now goes nowhere.
+  bool isClosed() const { return isClosed_; }
 
   /// Writes one record; several lines if `text` has line ends.
   void line(std::string_view text);

@@ -81,6 +81,19 @@ TEST_F(RunLogTest, RecordsOfAnotherWriterAreNotOverwritten) {
   ::close(copy);
 }
 
+TEST_F(RunLogTest, WhatComesAfterItsEndIsPassedOnAndNotCounted) {
+  std::vector<std::string> heard;
+  ASSERT_TRUE(log_.open(path_, reason_)) << reason_;
+  log_.passWarningsTo([&heard](std::string_view text) { heard.emplace_back(text); });
+  for (const char* text : {"once closed", "twice closed"}) {
+    log_.close();
+    log_.warning(text);
+  }
+  EXPECT_EQ(heard, (std::vector<std::string>{"Warning: once closed", "Warning: twice closed"}));
+  EXPECT_EQ(log_.warningCount(), 0);
+  EXPECT_EQ(content(), "");
+}
+
 TEST_F(RunLogTest, AFileThatIsRemovedUnderWayComesBackWithAllThatWasInIt) {
   ASSERT_TRUE(log_.open(path_, reason_)) << reason_;
   log_.line("first");
