@@ -41,6 +41,7 @@ std::size_t indexOf(std::vector<SeriesReference>& table, const SeriesReference& 
 
 std::vector<std::string> namesOf(const std::vector<SeriesReference>& files) {
   std::vector<std::string> names;
+  names.reserve(files.size());
   for (const SeriesReference& file : files) names.push_back(file.fileName);
   return names;
 }
