@@ -63,15 +63,19 @@ void appendSummaries(std::vector<std::string>& lines, const std::string& title, 
 
 const SettingSection<UncertaintySection>& uncertaintySection() {
   static const SettingSection<UncertaintySection> section{
-      {"UNCERTAINTY_ESTIMATION",
+      {std::string_view(kUncertaintySection),
        "when `Option` is 3",
        "Uncertainty analysis by sampling.",
-       {setting<UncertaintySection>([](auto& s) -> auto& { return s.settings.samplingType; },
-                                    {.name = "Uncertainty_Type",
-                                     .range = between(0, 1),
-                                     .codes = kSamplingTypeNames,
-                                     .refusal = "Error: Invalid uncertainty estimation type selection",
-                                     .meaning = "How the parameter sets are drawn."}),
+       {choice<UncertaintySection>(
+            [](UncertaintySection& s, const SetupValue& value) {
+              const auto* number = std::get_if<std::int32_t>(&value);  // a name selects another form of the task
+              if (number != nullptr) s.settings.samplingType = static_cast<SamplingType>(*number);
+            },
+            {.name = kUncertaintyTypeKeyword,
+             .range = between(0, 1),
+             .codes = kSamplingTypeNames,
+             .refusal = "Error: Invalid uncertainty estimation type selection",
+             .meaning = "How the parameter sets are drawn."}),
         setting<UncertaintySection>([](auto& s) -> auto& { return s.settings.sampleSize; },
                                     {.name = kSampleSizeKeyword,
                                      .range = from(2),

@@ -27,6 +27,7 @@ struct NormalDistribution {
 };
 
 enum class SamplingType : std::int32_t { simpleRandom = 0, latinHypercube = 1 };
+/// The forms of the uncertainty analysis; those that do not sample independently have a name only.
 inline constexpr CodeName kSamplingTypeNames[] = {{0, "simple random"}, {1, "Latin hypercube"}};
 
 /// At which times the bands of simulated series are made. Without codes: names only, in the order of the enumerators.
@@ -46,6 +47,8 @@ struct UncertaintySettings {
   std::int32_t matrixLimit = kMatrixLimit;
 };
 
+inline constexpr std::string_view kUncertaintySection = "UNCERTAINTY_ESTIMATION";
+inline constexpr std::string_view kUncertaintyTypeKeyword = "Uncertainty_Type";
 inline constexpr std::string_view kSampleSizeKeyword = "Sample_Size";
 inline constexpr std::string_view kBandTimesKeyword = "Band_Times";
 inline constexpr std::string_view kBandEndKeyword = "Band_End_Date";

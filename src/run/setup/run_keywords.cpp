@@ -185,6 +185,11 @@ const SetupSchema& setupSchema() {
     for (const auto& task : tasks().all()) {
       const auto sections = task->sections();
       rows.insert(rows.end(), sections.begin(), sections.end());
+      for (const auto& form : furtherTaskForms()) {
+        if (form->facts().name.name != task->facts().name.name) continue;
+        const auto further = form->sections();
+        rows.insert(rows.end(), further.begin(), further.end());
+      }
     }
     rows.insert(rows.end(), {&slotsSection().row, &measureFileSection().row,
                              &listSection("ObjectiveFunctions/OUTPUT_MEASURES/FURTHER_FILES"),

@@ -26,6 +26,7 @@
 #include "run/setup/setting_doubts.h"
 #include "run/setup/setup_warnings.h"
 #include "run/setup/validation.h"
+#include "run/tasks/tasks.h"
 
 namespace mirevo {
 namespace {
@@ -144,6 +145,7 @@ void SetupReader::readSimulationOption() {
   checkBaseFolder(section);
   file_.need(seriesSections(target_));
   if (config_.task) {
+    if (auto form = selectedForm(*config_.task, target_)) config_.task = std::move(form);
     file_.need(config_.task->neededSections(target_));
   } else {
     section.warn("Option", "no task has this number, nothing will be run");

@@ -18,24 +18,12 @@
 #include "parameters/parameter_model.h"
 #include "run/tasks/analysis_names.h"
 #include "run/tasks/infeasible_sets.h"
+#include "run/tasks/sensitivity_section.h"
 
 namespace mirevo {
 namespace {
 
-constexpr CodeName kTypeNames[] = {{0, "local"}};
-
-const SettingSection<SensitivityTask>& sensitivitySection() {
-  static const SettingSection<SensitivityTask> section{
-      {"SENSITIVITY_ANALYSIS",
-       "when `Option` is 1",
-       "Sensitivity analysis.",
-       {setting<&SensitivityTask::type>({.name = "Sensitivity_Type",
-                                         .range = between(0, 0),
-                                         .codes = kTypeNames,
-                                         .refusal = "Error: Invalid sensitivity type selection",
-                                         .meaning = "0 local sensitivity analysis."})}}};
-  return section;
-}
+constexpr TaskForm kLocalForm{kSensitivitySection, kSensitivityTypeKeyword, kSensitivityTypeNames[0]};
 
 /// Refuses the setup unless every parameter has room for its perturbation within its bounds.
 void validateLocalSensitivity(const SensitivitySettings& settings, std::span<const ModelParameter> parameters,
@@ -194,7 +182,7 @@ void takeExactAggregates(const TaskContext& context, std::span<EvaluationResult>
 }  // namespace
 
 const TaskFacts& SensitivityTask::facts() const {
-  static constexpr TaskFacts kFacts{{1, "sensitivity"}, "sensitivity analysis", run_files::kSensitivity};
+  static constexpr TaskFacts kFacts{{1, "sensitivity"}, "sensitivity analysis", run_files::kSensitivity, kLocalForm};
   return kFacts;
 }
 
@@ -207,8 +195,8 @@ std::vector<std::string> SensitivityTask::neededSections(const SetupSection& /*t
 }
 
 void SensitivityTask::read(const TaskReading& reading) {
-  const SetupSection section = reading.target.open("SENSITIVITY_ANALYSIS");
-  section.read(sensitivitySection(), *this);
+  const SetupSection section = reading.target.open(kSensitivitySection);
+  section.read(sensitivitySection(), *static_cast<Task*>(this));
   const SetupSection local = section.open("LOCAL_SA");
   local.read(localSensitivitySection(), settings);
   validateLocalSensitivity(settings, reading.parameters, local);

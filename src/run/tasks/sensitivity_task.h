@@ -5,8 +5,6 @@
 
 namespace mirevo {
 
-enum class SensitivityType : std::int32_t { local = 0 };
-
 /// Local sensitivity analysis, with the covariance of the parameters if the setup asks for it.
 class SensitivityTask final : public Task {
  public:
@@ -23,7 +21,6 @@ class SensitivityTask final : public Task {
   std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const override;
   TaskReport report() const override { return {.sensitivity = &settings}; }
 
-  SensitivityType type = SensitivityType::local;
   SensitivitySettings settings;
 
  private:

@@ -30,11 +30,21 @@ namespace mirevo {
 
 struct SensitivitySettings;
 
+/// A form of a task and the keyword that selects it.
+struct TaskForm {
+  std::string_view section = {};  ///< "SENSITIVITY_ANALYSIS"; empty: the task has one form only
+  std::string_view keyword = {};  ///< "Sensitivity_Type"
+  CodeName name = {};             ///< one of the codes of the keyword
+};
+
 /// What is true of a task whatever its settings.
 struct TaskFacts {
   CodeName name;              ///< in setups; the name is also used in the run record and the report: "optimisation"
   std::string_view longName;  ///< "parameter optimisation"
   ResultFileNames resultFiles;
+  /// Of a task of several forms, each a Task of its own, the one that this is, as in `Sensitivity_Type = 'Morris'`. All
+  /// have the same name and results, and share the section with the keyword that chooses among them.
+  TaskForm form = {};
 };
 
 /// What a task may use while it reads its sections.

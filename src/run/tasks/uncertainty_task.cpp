@@ -97,7 +97,10 @@ std::vector<std::string> reportBands(const TaskContext& context, bool hasSteps,
 }  // namespace
 
 const TaskFacts& UncertaintyTask::facts() const {
-  static constexpr TaskFacts kFacts{{3, "uncertainty"}, "uncertainty analysis", run_files::kPlain};
+  static constexpr TaskFacts kFacts{{3, "uncertainty"},
+                                    "uncertainty analysis",
+                                    run_files::kPlain,
+                                    {kUncertaintySection, kUncertaintyTypeKeyword, kSamplingTypeNames[0]}};
   return kFacts;
 }
 
