@@ -194,8 +194,14 @@ void Planner::stepFromBase(EffectTrajectory& trajectory, std::size_t j, double t
 void Planner::planRadial() {
   const auto r = static_cast<std::size_t>(settings_.trajectories);
   const std::size_t p = size();
-  const UnitPoints points =
+  UnitPoints points =
       2 * p <= kMaxSobolDimension ? scrambledSobol(r, 2 * p, random_) : latinHypercube(r, 2 * p, random_);
+  for (std::size_t j = p; j < 2 * p; ++j) {
+    for (std::size_t left = r; left > 1; --left) {
+      const auto pick = static_cast<std::size_t>(random_.next() * static_cast<double>(left));
+      std::swap(points[left - 1][j], points[pick][j]);
+    }
+  }
   for (const std::vector<double>& point : points) {
     EffectTrajectory& trajectory = plan_.trajectories.emplace_back();
     for (std::size_t j = 0; j < p; ++j) trajectory.base.push_back(insideCube(point[j]));
