@@ -158,8 +158,8 @@ void printCoverage() {
   };
   const Case cases[] = {{"radial", {}, 0},
                         {"radial, a tenth fails", {}, 10},
-                        {"random trajectories", {.design = EffectDesign::trajectories, .candidates = 1}, 0},
-                        {"most different trajectories", {.design = EffectDesign::trajectories}, 0}};
+                        {"trajectories", {.design = EffectDesign::trajectories}, 0},
+                        {"trajectories, a tenth fails", {.design = EffectDesign::trajectories}, 10}};
   fmt::print(
       "| design | function | trajectories | mu | mu* | sigma | share | least mu* | fixed, wrongly |\n"
       "|---|---|---|---|---|---|---|---|---|\n");
