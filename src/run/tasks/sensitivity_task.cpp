@@ -17,6 +17,7 @@
 #include "measures/statistics.h"
 #include "parameters/parameter_model.h"
 #include "run/tasks/analysis_names.h"
+#include "run/tasks/distribution_reading.h"
 #include "run/tasks/infeasible_sets.h"
 #include "run/tasks/sensitivity_section.h"
 
@@ -187,7 +188,9 @@ const TaskFacts& SensitivityTask::facts() const {
 }
 
 std::vector<const SectionRow*> SensitivityTask::sections() const {
-  return {&sensitivitySection().row, &localSensitivitySection().row};
+  std::vector<const SectionRow*> rows{&sensitivitySection().row, &localSensitivitySection().row};
+  for (const SectionRow* row : distributionSections(kSensitivitySection)) rows.push_back(row);
+  return rows;
 }
 
 std::vector<std::string> SensitivityTask::neededSections(const SetupSection& /*target*/) const {
