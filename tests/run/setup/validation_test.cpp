@@ -230,7 +230,12 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
       {earlier + "'setup_Optimisation.dat'\nEarlier_Result_Sets = 0", "No. of sets of the earlier result file invalid",
        "expected 1 or more, found 0"},
       {"Initial_Sample_Generation = 4 => Initial_Sample_Generation = 4\nEarlier_Result_File = 'other.dat'",
-       "Earlier result file invalid", "expected this or Initial_Sample_Generation = 4, found both"},
+       "Earlier result file invalid",
+       "expected this or Initial_Sample_Generation = 4, found both. Leave out the latter"},
+      {"'sample.txt' => '' & Initial_Sample_Generation = 4 => Initial_Sample_Generation = 4\nEarlier_Result_File = "
+       "'other.dat'",
+       "Earlier result file invalid",
+       "setup.kdx:143:23: Earlier_Result_File: expected this or Initial_Sample_Generation = 4"},
       {"Algorithm_Type = 1 => 'PDDS' & [SURROGATE_MODEL_PARAMETERS] => [X] & [/SURROGATE_MODEL_PARAMETERS] => [/X]",
        "Unable to open section SURROGATE_MODEL_PARAMETERS in KDX file",
        "Use_Surrogate_Model: Parallel Dynamically Dimensioned Search uses no surrogate model: expected 0"},
