@@ -101,6 +101,11 @@ export function hostile(data) {
     data.sensitivity.covariance.names = data.sensitivity.covariance.names.map(rename);
     data.sensitivity.covariance.leftOut = [{ name: kHostile[0], reason: kHostile[1] }];
   }
+  for (const screening of data.morris ?? []) {
+    screening.name = rename(screening.name);
+    for (const parameter of screening.parameters) parameter.name = rename(parameter.name);
+    Object.assign(screening.parameters[0], { sigma: [1, null, null], verdict: 'fix' });
+  }
   Object.assign(data.run, { title: kHostile[0] + kHostile[4], taskName: kHostile[1], message: kHostile[5], notes: [...kHostile] });
   data.failures = kHostile.map((text) => ({ reason: text, count: 1, example: text }));
   data.summary = [...kHostile];
