@@ -342,6 +342,7 @@ std::vector<RowInSetup> rowsInSetups(const std::string& setup) {
       {"SCENARIOS", "0"}, {"SENSITIVITY_ANALYSIS", "1"}, {"UNCERTAINTY_ESTIMATION", "3"}};
   static const std::pair<std::string_view, const char*> kAlgorithms[] = {
       {"SCE_", "0"}, {"DDS_", "2"}, {"PDDS_", "'PDDS'"}, {"OPSE_", "'OPSE'"}};
+  static const std::pair<std::string_view, const char*> kForms[] = {{"/MORRIS", "'Morris'"}};
   std::vector<RowInSetup> found;
   for (const SectionRow* section : setupSchema().sections()) {
     // Which keywords of these are read depends on others of them: tests/run/tasks/distribution_reading_test.cpp.
@@ -359,6 +360,10 @@ std::vector<RowInSetup> rowsInSetups(const std::string& setup) {
       if (section->path.find(start) == std::string_view::npos) continue;
       text = SetupFixture::withValue(text, "OPTIMISATION_ALGORITHM", "Algorithm_Type", algorithm);
       text = SetupFixture::withValue(text, "SimultaneousSimulations", "NoSimultaneousSim", "1");
+    }
+    for (const auto& [end, form] : kForms) {
+      if (!section->path.ends_with(end)) continue;
+      text = SetupFixture::withValue(text, "SENSITIVITY_ANALYSIS", "Sensitivity_Type", form);
     }
     for (const KeywordRow& row : section->keywords) {
       if (row.store != nullptr) found.push_back({section, &row, text});
