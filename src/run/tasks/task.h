@@ -112,6 +112,7 @@ struct TaskReport {
   int populationSize = 0;                            ///< 0: none
   bool hasBands = false;                             ///< it writes bands of simulated series
   const SensitivitySettings* sensitivity = nullptr;  ///< for a local sensitivity analysis, else null
+  bool hasMorris = false;                            ///< it writes the table of a Morris screening
   std::vector<std::string> runNames = {};  ///< of the evaluations, from the first on; empty where one has none
 };
 
