@@ -85,14 +85,13 @@ void printRow(const std::string& name, const Case& function, const std::vector<S
 }
 
 void printHard() {
-  for (const int budget : {5000, 20000}) {
-    fmt::print("\nMedian best value over {} trials, {} evaluations (successes / their mean evaluations)\n\n", kTrials,
-               budget);
-    printHead("function", searches(budget));
-    for (const std::size_t n : {std::size_t{10}, std::size_t{20}}) {
-      for (const Case& function : hardFunctionsOf(n)) {
-        printRow(fmt::format("{} {}-D", function.name, n), function, searches(budget), kTrials);
-      }
+  constexpr int kBudget = 5000;
+  fmt::print("\nMedian best value over {} trials, {} evaluations (successes / their mean evaluations)\n\n", kTrials,
+             kBudget);
+  printHead("function", searches(kBudget));
+  for (const std::size_t n : {10, 20}) {
+    for (const Case& function : hardFunctionsOf(n)) {
+      printRow(fmt::format("{} {}-D", function.name, n), function, searches(kBudget), kTrials);
     }
   }
 }

@@ -11,12 +11,16 @@
 #include "algorithms/searches/initial_sample.h"
 #include "algorithms/searches/population_search.h"
 #include "algorithms/searches/pse_keywords.h"
+#include "common/text.h"
 
 namespace mirevo {
 namespace {
 
 constexpr std::string_view kPopulationRefusal = "Error: Population size in CMA-ES algorithm invalid";
 constexpr std::string_view kBudgetUsedUp = "Optimisation terminated: Maximum number of model evaluations reached";
+
+/// Runs of which the log tells one by one.
+constexpr int kMostNotedRuns = 40;
 
 std::size_t populationOf(const CmaEsSettings& settings, std::size_t n) {
   return settings.populationSize > 0 ? static_cast<std::size_t>(settings.populationSize) : cmaPopulationSize(n);
@@ -145,11 +149,13 @@ SearchStatus CmaEs::advance() {
   for (std::size_t i = 0; i < count; ++i) {
     points[i].result = std::move(results[i]);
     noteBest(points[i].set, points[i].result);
+    if (isBetter(points[i].result.aggregate, bestOfRun_)) bestOfRun_ = points[i].result.aggregate;
   }
   ++summary_.loopCount;
   noteGeneration(points);
   if (!isCut) learnFrom(points);
   if (budgetLeft() <= 0) {
+    noteRun("was going on when the budget was used up");
     summary_.terminationMessage = kBudgetUsedUp;
   } else if (!tests_->reason().empty()) {
     endRun(tests_->reason());
@@ -204,7 +210,6 @@ void CmaEs::learnFrom(std::vector<Point>& points) {
   margin_.keepOpen(*distribution_);
   std::sort(values.begin(), values.end());
   tests_->update(*distribution_, margin_, values);
-  if (!values.empty() && isBetter(values.front(), bestOfRun_)) bestOfRun_ = values.front();
   change_->update(bestOfRun_, 0, std::numeric_limits<double>::infinity());
 }
 
@@ -214,10 +219,20 @@ bool CmaEs::isAhead(const Point& a, const Point& b) const {
   return a.rank < b.rank;
 }
 
+void CmaEs::noteRun(std::string_view end) {
+  if (runCount_ > kMostNotedRuns) {
+    summary_.notes.resize(kMostNotedRuns);
+    summary_.notes.push_back(fmt::format("Further runs of CMA-ES: {}", runCount_ - kMostNotedRuns));
+    return;
+  }
+  summary_.notes.push_back(
+      fmt::format("Run {} of CMA-ES: {} points in a generation, {} model evaluations, best objective value {}, {}",
+                  runCount_, run_.population, summary_.evaluationCount - startedAt_, formatReal(bestOfRun_), end));
+}
+
 void CmaEs::endRun(std::string_view reason) {
+  noteRun(fmt::format("ended as {}", reason));
   const int made = summary_.evaluationCount - startedAt_;
-  summary_.notes.push_back(fmt::format("Run {} of CMA-ES: {} points in a generation, {} model evaluations, ended as {}",
-                                       runCount_, run_.population, made, reason));
   const std::optional<CmaRun> next = restarts_.next(run_, made, problem_.random);
   if (!next) {
     summary_.terminationMessage = fmt::format("Optimisation terminated: The last run of CMA-ES ended as {}", reason);

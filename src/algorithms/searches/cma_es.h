@@ -52,6 +52,7 @@ class CmaEs final : public SearchAlgorithm {
   bool isProblemValid() const;
   std::vector<double> centreOf(std::span<const ParameterSet> sample, std::span<const EvaluationResult> results) const;
   void startRun(const CmaRun& run, std::vector<double> mean);
+  void noteRun(std::string_view end);
   /// Ends the run and starts the next one, or ends the search.
   void endRun(std::string_view reason);
   Point drawPoint();
