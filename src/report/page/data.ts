@@ -239,6 +239,41 @@ export interface Screening {
   parameters: EffectsOfParameter[];
 }
 
+/** An index, the limits that hold it with 95 %, and the blocks of the design that it is of. */
+export type SobolIndex = [Maybe, Maybe, Maybe, number];
+
+export interface SobolOutput {
+  kind: 'measure' | 'objective';
+  name: string;
+  first: SobolIndex[]; // one per factor
+  total: SobolIndex[];
+  interactions: SobolIndex[];
+  sumOfFirst: SobolIndex[]; // one
+  second: Maybe[][]; // of each two factors, above the diagonal; empty where it was not asked for
+  rows: number[]; // sizes of the sample
+  stages: { total: SobolIndex[] }[]; // one per size
+}
+
+export interface SobolSeries {
+  measure: string;
+  quantity?: string | null;
+  unit?: string | null;
+  stride: number; // every so many-th time is here
+  times: number[];
+  observed: Maybe[];
+  mean: Maybe[];
+  deviation: Maybe[];
+  first: Maybe[][]; // one row per factor
+  total: Maybe[][];
+}
+
+export interface Sobol {
+  factors: string[];
+  negligible: number;
+  outputs: SobolOutput[];
+  series: SobolSeries[];
+}
+
 export interface ReportData {
   format: number;
   program: string;
@@ -257,6 +292,7 @@ export interface ReportData {
   band: Band[];
   sensitivity: Sensitivity | null;
   morris: Screening[];
+  sobol?: Sobol | null;
   summary: string[];
 }
 
