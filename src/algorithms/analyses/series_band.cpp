@@ -7,6 +7,7 @@
 #include <fmt/format.h>
 
 #include "algorithms/numbers/sample_summary.h"
+#include "algorithms/numbers/weighted_sample.h"
 #include "common/calendar.h"
 #include "common/text.h"
 #include "measures/dates.h"
@@ -19,9 +20,56 @@ std::string cell(double value) {
   return std::isfinite(value) ? fmt::format("{}", static_cast<float>(value)) : "NaN";
 }
 
+/// What makes the quantiles of one time after another.
+class TimeQuantiles final {
+ public:
+  explicit TimeQuantiles(std::span<const double> weights) : weights_(weights) {}
+
+  void take(std::span<const double> values) {
+    if (!weights_.empty()) {
+      weighted_.take(values, weights_);
+      return;
+    }
+    values_.clear();
+    for (const double value : values) {
+      if (std::isfinite(value)) values_.push_back(value);
+    }
+    std::sort(values_.begin(), values_.end());
+  }
+  std::size_t count() const { return weights_.empty() ? values_.size() : weighted_.count(); }
+  double at(double probability) const {
+    return weights_.empty() ? sortedQuantile(values_, probability) : weighted_.at(probability);
+  }
+
+ private:
+  std::span<const double> weights_;
+  WeightedQuantiles weighted_;
+  std::vector<double> values_;
+};
+
+/// How wide the band is where something is observed.
+void measureWidth(std::span<const double> observed, SeriesBand& band) {
+  double width = 0.0;
+  double mean = 0.0;
+  double squares = 0.0;
+  double count = 0.0;
+  for (std::size_t t = 0; t < observed.size(); ++t) {
+    if (band.runs[t] == 0 || std::isnan(observed[t])) continue;
+    count += 1.0;
+    width += (band.upper[t] - band.lower[t] - width) / count;
+    const double difference = observed[t] - mean;
+    mean += difference / count;
+    squares += difference * (observed[t] - mean);
+  }
+  const double deviation = std::sqrt(squares / count);
+  band.meanWidth = count > 0.0 ? width : std::numeric_limits<double>::quiet_NaN();
+  band.relativeWidth = deviation > 0.0 ? width / deviation : std::numeric_limits<double>::quiet_NaN();
+}
+
 }  // namespace
 
-SeriesBand seriesBand(std::span<const double> observed, std::size_t evaluations, const ReadColumns& read) {
+SeriesBand seriesBand(std::span<const double> observed, std::size_t evaluations, const ReadColumns& read,
+                      std::span<const double> weights) {
   // A MB at a time; of many evaluations or times up to 64, as every time costs a walk through all evaluations.
   constexpr std::size_t kValuesAtOnce = std::size_t{1} << 17;
   constexpr std::size_t kMostWalks = 32;
@@ -32,19 +80,15 @@ SeriesBand seriesBand(std::span<const double> observed, std::size_t evaluations,
   SeriesBand band;
   std::size_t inside = 0;
   std::vector<double> columns;
-  std::vector<double> values;
+  TimeQuantiles quantiles(weights);
   for (std::size_t t = 0; t < observed.size(); ++t) {
     if (t % atOnce == 0) columns = read(t, std::min(atOnce, observed.size() - t));
-    values.clear();
-    for (const double value : std::span(columns).subspan(t % atOnce * evaluations, evaluations)) {
-      if (std::isfinite(value)) values.push_back(value);
-    }
-    std::sort(values.begin(), values.end());
-    band.lower.push_back(sortedQuantile(values, 0.05));
-    band.median.push_back(sortedQuantile(values, 0.50));
-    band.upper.push_back(sortedQuantile(values, 0.95));
-    band.runs.push_back(values.size());
-    if (values.empty()) continue;
+    quantiles.take(std::span(columns).subspan(t % atOnce * evaluations, evaluations));
+    band.lower.push_back(quantiles.at(0.05));
+    band.median.push_back(quantiles.at(0.50));
+    band.upper.push_back(quantiles.at(0.95));
+    band.runs.push_back(quantiles.count());
+    if (quantiles.count() == 0) continue;
     ++band.timeCount;
     if (std::isnan(observed[t])) continue;
     ++band.observationCount;
@@ -60,7 +104,16 @@ SeriesBand seriesBand(std::span<const double> observed, std::size_t evaluations,
   band.shareInside = band.observationCount == 0
                          ? std::numeric_limits<double>::quiet_NaN()
                          : static_cast<double>(inside) / static_cast<double>(band.observationCount);
+  measureWidth(observed, band);
   return band;
+}
+
+std::string bandWidthText(const SeriesBand& band) {
+  if (band.observationCount == 0) return "";
+  std::string text = fmt::format("a mean width of {:.4g} at the observations", band.meanWidth);
+  if (std::isfinite(band.relativeWidth))
+    text += fmt::format(", {:.2f} of their standard deviation", band.relativeWidth);
+  return text;
 }
 
 std::string fewerRunsText(const SeriesBand& band) {

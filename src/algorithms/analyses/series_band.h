@@ -23,6 +23,11 @@ struct SeriesBand {
   std::size_t mostRuns = 0;          ///< largest
   std::size_t fewerRunsCount = 0;    ///< times with fewer than the largest number
   double shareInside = 0.0;          ///< share of observations inside the band, limits included; NaN if there are none
+  double meanWidth = 0.0;            ///< of the 90 % band at the observations, in the unit of the series; likewise
+  /// The mean width over the standard deviation (divisor n) of the observations: above 1 the band is wider than what
+  /// the observations vary. NaN if there are none or they do not vary. Abbaspour, Johnson and van Genuchten (2004,
+  /// doi:10.2136/vzj2004.1340) call it the d-factor.
+  double relativeWidth = 0.0;
 };
 
 /// The simulated values of all successful evaluations at `count` times of a series from index `first` on; those at the
@@ -30,8 +35,13 @@ struct SeriesBand {
 using ReadColumns = std::function<std::vector<double>(std::size_t first, std::size_t count)>;
 
 /// The band over `evaluations` successful ones; `observed` has a value per time, NaN where there is none. Asks for the
-/// values of a few times at a time. Values that are not finite are left out.
-SeriesBand seriesBand(std::span<const double> observed, std::size_t evaluations, const ReadColumns& read);
+/// values of a few times at a time. Values that are not finite are left out. `weights`: one per evaluation, with which
+/// the quantiles are WeightedQuantiles; empty: quantiles of type 7.
+SeriesBand seriesBand(std::span<const double> observed, std::size_t evaluations, const ReadColumns& read,
+                      std::span<const double> weights = {});
+
+/// "a mean width of 2.31 at the observations, 0.84 of their standard deviation"; empty without an observation.
+std::string bandWidthText(const SeriesBand& band);
 
 /// "its quantiles are of 3 to 20 runs ..."; empty where all are of equally many.
 std::string fewerRunsText(const SeriesBand& band);
