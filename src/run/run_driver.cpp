@@ -348,7 +348,8 @@ TaskContext RunDriver::taskContext() {
           config_.validationPeriods,
           [this](const std::string& file) {
             return readEarlierSample(file, config_, parameters_->searchSpace(), runner_->output().observedSeries());
-          }};
+          },
+          runner_->output().validationObservations()};
 }
 
 TaskOutcome RunDriver::runTask() {
@@ -500,7 +501,7 @@ void RunDriver::finish(const TaskOutcome& outcome) {
     showMessage(fmt::format("Warning: The end of {} may be missing: {}", state_.log.path(), state_.log.writeError()));
   }
   endProgress(kNormalTermination);
-  if (count == 0) {
+  if (count == 0 && outcome.tables.empty()) {
     showMessage("Nothing was run: the setup selects no task or no search", {}, MessageType::warning);
   }
   tellOfBestThatDiffers();

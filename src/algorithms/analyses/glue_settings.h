@@ -31,12 +31,12 @@ inline constexpr CodeName kLikelihoodNames[] = {{std::nullopt, "efficiency"},
 /// The section UNCERTAINTY_ESTIMATION/GLUE. All but the sampling can be changed without another model run.
 struct GlueSettings {
   GlueSampling sampling = GlueSampling::latinHypercube;
-  std::string judgedBy;             ///< an output measure or an objective function; empty: see glueJudge()
-  std::optional<double> threshold;  ///< on the scale of what judges; one of this and `share` is given
-  std::optional<double> share;      ///< of the evaluations that succeeded, the best
+  std::string judgedBy = {};             ///< an output measure or an objective function; empty: see glueJudge()
+  std::optional<double> threshold = {};  ///< on the scale of what judges; one of this and `share` is given
+  std::optional<double> share = {};      ///< of the evaluations that succeeded, the best
   LikelihoodShape likelihood = LikelihoodShape::inverseVariance;
-  double shapeFactor = 1.0;  ///< N, above 0
-  std::string earlierFile;   ///< the result file of the run whose evaluations are judged; empty: the sets are run
+  double shapeFactor = 1.0;      ///< N, above 0
+  std::string earlierFile = {};  ///< the result file of the run whose evaluations are judged; empty: the sets are run
 };
 
 inline constexpr std::string_view kGlueSectionName = "GLUE";

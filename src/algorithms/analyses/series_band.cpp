@@ -47,24 +47,31 @@ class TimeQuantiles final {
   std::vector<double> values_;
 };
 
-/// How wide the band is where something is observed.
-void measureWidth(std::span<const double> observed, SeriesBand& band) {
-  double width = 0.0;
-  double mean = 0.0;
-  double squares = 0.0;
-  double count = 0.0;
-  for (std::size_t t = 0; t < observed.size(); ++t) {
-    if (band.runs[t] == 0 || std::isnan(observed[t])) continue;
-    count += 1.0;
-    width += (band.upper[t] - band.lower[t] - width) / count;
-    const double difference = observed[t] - mean;
-    mean += difference / count;
-    squares += difference * (observed[t] - mean);
+/// Gathers what lies in a band.
+class CoverageCount final {
+ public:
+  void add(double observed, double lower, double upper) {
+    count_ += 1.0;
+    if (observed >= lower && observed <= upper) inside_ += 1.0;
+    width_ += (upper - lower - width_) / count_;
+    const double difference = observed - mean_;
+    mean_ += difference / count_;
+    squares_ += difference * (observed - mean_);
   }
-  const double deviation = std::sqrt(squares / count);
-  band.meanWidth = count > 0.0 ? width : std::numeric_limits<double>::quiet_NaN();
-  band.relativeWidth = deviation > 0.0 ? width / deviation : std::numeric_limits<double>::quiet_NaN();
-}
+  BandCoverage found() const {
+    const double deviation = std::sqrt(squares_ / count_);
+    constexpr double kNone = std::numeric_limits<double>::quiet_NaN();
+    return {static_cast<std::size_t>(count_), count_ > 0.0 ? inside_ / count_ : kNone, count_ > 0.0 ? width_ : kNone,
+            deviation > 0.0 ? width_ / deviation : kNone};
+  }
+
+ private:
+  double count_ = 0.0;
+  double inside_ = 0.0;
+  double width_ = 0.0;
+  double mean_ = 0.0;     ///< of the observations
+  double squares_ = 0.0;  ///< of their differences to it
+};
 
 }  // namespace
 
@@ -78,7 +85,7 @@ SeriesBand seriesBand(std::span<const double> observed, std::size_t evaluations,
   const std::size_t ofWalk = std::min(observed.size() / kMostWalks, kMostValuesAtOnce / runCount);
   const std::size_t atOnce = std::max(kValuesAtOnce / runCount, ofWalk + 1);
   SeriesBand band;
-  std::size_t inside = 0;
+  CoverageCount coverage;
   std::vector<double> columns;
   TimeQuantiles quantiles(weights);
   for (std::size_t t = 0; t < observed.size(); ++t) {
@@ -90,9 +97,7 @@ SeriesBand seriesBand(std::span<const double> observed, std::size_t evaluations,
     band.runs.push_back(quantiles.count());
     if (quantiles.count() == 0) continue;
     ++band.timeCount;
-    if (std::isnan(observed[t])) continue;
-    ++band.observationCount;
-    if (observed[t] >= band.lower[t] && observed[t] <= band.upper[t]) ++inside;
+    if (!std::isnan(observed[t])) coverage.add(observed[t], band.lower[t], band.upper[t]);
   }
   for (const std::size_t count : band.runs) band.mostRuns = std::max(band.mostRuns, count);
   band.fewestRuns = band.mostRuns;
@@ -101,18 +106,32 @@ SeriesBand seriesBand(std::span<const double> observed, std::size_t evaluations,
     band.fewestRuns = std::min(band.fewestRuns, count);
     ++band.fewerRunsCount;
   }
-  band.shareInside = band.observationCount == 0
-                         ? std::numeric_limits<double>::quiet_NaN()
-                         : static_cast<double>(inside) / static_cast<double>(band.observationCount);
-  measureWidth(observed, band);
+  band.coverage = coverage.found();
   return band;
 }
 
-std::string bandWidthText(const SeriesBand& band) {
-  if (band.observationCount == 0) return "";
-  std::string text = fmt::format("a mean width of {:.4g} at the observations", band.meanWidth);
-  if (std::isfinite(band.relativeWidth))
-    text += fmt::format(", {:.2f} of their standard deviation", band.relativeWidth);
+BandCoverage coverageOf(const SeriesBand& band, const ObservedSeries& ofBand, const ObservedSeries& others) {
+  const std::int64_t bandOrigin = secondNumber(ofBand.start);
+  const std::int64_t origin = secondNumber(others.start);
+  CoverageCount coverage;
+  std::size_t t = 0;
+  for (std::size_t i = 0; i < others.days.size(); ++i) {
+    const std::int64_t second = secondAfter(origin, others.days[i]);
+    while (t < ofBand.days.size() && secondAfter(bandOrigin, ofBand.days[t]) < second) ++t;
+    if (t == ofBand.days.size()) break;
+    if (secondAfter(bandOrigin, ofBand.days[t]) != second || band.runs[t] == 0 || std::isnan(others.values[i]))
+      continue;
+    coverage.add(others.values[i], band.lower[t], band.upper[t]);
+  }
+  return coverage.found();
+}
+
+std::string bandWidthText(const BandCoverage& coverage) {
+  if (coverage.observationCount == 0) return "";
+  std::string text = fmt::format("a mean width of {:.4g} at the observations", coverage.meanWidth);
+  if (std::isfinite(coverage.relativeWidth)) {
+    text += fmt::format(", {:.2f} of their standard deviation", coverage.relativeWidth);
+  }
   return text;
 }
 
@@ -120,7 +139,7 @@ std::string fewerRunsText(const SeriesBand& band) {
   if (band.fewerRunsCount == 0) return "";
   return fmt::format(
       "at {} of {} {} the quantiles are of fewer runs than at the others, of {} to {}: runs have no value there",
-      band.fewerRunsCount, band.timeCount, band.timeCount == band.observationCount ? "observations" : "times",
+      band.fewerRunsCount, band.timeCount, band.timeCount == band.coverage.observationCount ? "observations" : "times",
       band.fewestRuns, band.mostRuns);
 }
 

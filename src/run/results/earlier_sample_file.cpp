@@ -93,10 +93,11 @@ void compareSettings(const std::string& resultFile, const RunConfig& config, Ear
   for (const ResultSetting& setting : then->settings) {
     if (setting.keyword != "Option" || (setting.value != "1" && setting.value != "2")) continue;
     found.warnings.push_back(fmt::format(
-        "The sets in {} are those of a {}, which went where the fit is better or one parameter differs, and no sample "
-        "of a distribution: quantiles and bands say how those sets are distributed, and not how uncertain the "
-        "parameters are",
-        resultFile, setting.value == "1" ? "sensitivity analysis" : "search"));
+        "The sets in {} are those of a {} and no sample of a distribution: quantiles and bands say how those sets are "
+        "distributed, and not how uncertain the parameters are",
+        resultFile,
+        setting.value == "1" ? "sensitivity analysis, which change one parameter or few,"
+                             : "search, which went where the fit is better,"));
   }
 }
 

@@ -46,6 +46,12 @@ UnitPoints pointsOf(GlueSampling sampling, std::size_t count, std::size_t dimens
   return points;
 }
 
+/// The log has warnings as such; the result file has them, too.
+void addNotes(std::span<const std::string> warnings, std::vector<std::string>& report) {
+  if (!warnings.empty()) report.emplace_back();
+  for (const std::string& text : warnings) report.push_back("Note: " + text);
+}
+
 std::string samplingName(GlueSampling sampling) {
   return std::string(kGlueSamplingNames[static_cast<std::size_t>(sampling)].name);
 }
@@ -179,7 +185,6 @@ GlueTask::Found GlueTask::find(const TaskContext& context, const EarlierSample& 
   TaskOutcome& outcome = found.outcome;
   outcome.report = formatGlue(sample, weights, summary, judge_, glue, names,
                               fileNameOf(runFilePath(context.filePrefix, run_files::kSampleCorrelation)));
-  for (const std::string& text : found.warnings) outcome.report.push_back("Warning: " + text);
   outcome.tables = glueTables(sample, weights, summary, judge_, glue, names);
   if (!evaluated.simulatedColumns) return found;
   std::vector<int> numbers;
@@ -204,6 +209,7 @@ TaskOutcome GlueTask::run(const TaskContext& context) {
   for (const std::string& text : evaluated.warnings) context.log.warning(text);
   Found found = find(context, evaluated);
   logReport(context, found.outcome.report);
+  addNotes(found.warnings, found.outcome.report);
   for (const std::string& text : found.warnings) {
     if (!found.hasWeights && context.warnUser) {
       context.warnUser(text);
@@ -220,7 +226,9 @@ std::optional<TaskOutcome> GlueTask::unfinishedOutcome(const TaskContext& contex
   for (std::size_t i = 0; i < made.results.size(); ++i) {
     evaluated.sample.add(ToModelScale(context.space, made.sets[i]), made.results[i]);
   }
-  return find(context, evaluated).outcome;
+  Found found = find(context, evaluated);
+  addNotes(found.warnings, found.outcome.report);
+  return std::move(found.outcome);
 }
 
 }  // namespace mirevo

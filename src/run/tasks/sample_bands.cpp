@@ -31,6 +31,12 @@ std::string bandTimesText(const std::string& name, const ObservedSeries& series)
                      countWithoutObservation(series));
 }
 
+std::string coverageText(const std::string& name, const BandCoverage& coverage) {
+  if (coverage.observationCount == 0) return fmt::format("Band of {}: no observation has a simulated value", name);
+  return fmt::format("Band of {}: {:.1f} % of {} observations lie between the 5 and the 95 % quantile", name,
+                     100.0 * coverage.shareInside, coverage.observationCount);
+}
+
 std::string sizeText(std::uintmax_t bytes) {
   return fmt::format("{:.1f} MB", static_cast<double>(bytes) / 1e6);
 }
@@ -120,11 +126,16 @@ std::vector<std::string> reportBands(const TaskContext& context, const Uncertain
     const std::string& name = context.measures[observed.measure].name;
     files.push_back({runFilePath(context.filePrefix, run_files::kBand, static_cast<int>(observed.measure) + 1),
                      seriesBandText(name, observed, band, hasSteps)});
-    lines.push_back(band.observationCount == 0
-                        ? fmt::format("Band of {}: no observation has a simulated value", name)
-                        : fmt::format("Band of {}: {:.1f} % of {} observations lie between the 5 and the 95 % quantile",
-                                      name, 100.0 * band.shareInside, band.observationCount));
-    if (const std::string width = bandWidthText(band); !width.empty()) lines.push_back("   " + width);
+    lines.push_back(coverageText(name, band.coverage));
+    if (const std::string width = bandWidthText(band.coverage); !width.empty()) lines.push_back("   " + width);
+    for (const ValidationObservations& validation : context.validationObservations) {
+      if (validation.observed.measure != observed.measure) continue;
+      const BandCoverage unused = coverageOf(band, observed, validation.observed);
+      if (unused.observationCount == 0) continue;
+      const std::string period = context.validationPeriods[validation.period].name;
+      lines.push_back(coverageText(fmt::format("{} in {}, which judges no set", name, period), unused));
+      lines.push_back("   " + bandWidthText(unused));
+    }
     if (hasSteps) {
       lines.push_back(fmt::format("   at {} times, {} of them without an observation; quantiles of {} runs{}",
                                   observed.days.size(), countWithoutObservation(observed), band.mostRuns,

@@ -94,6 +94,8 @@ struct TaskContext {
   /// The evaluations of an earlier run with the same parameters, output measures and objective functions, by the path
   /// of its result file. Throws FatalError. May be empty.
   std::function<EarlierSample(const std::string& resultFile)> earlierSample = {};
+  /// The observations in validation periods, if the task keepsSimulatedValues().
+  std::span<const ValidationObservations> validationObservations = {};
 };
 
 /// A file beside the results.
