@@ -99,7 +99,6 @@ TEST(Glue, AnotherThresholdTakesAllResultsOverAndGivesWhatAFreshRunGives) {
   EXPECT_THAT(folder.read("basin_Band_1.csv"), HasSubstr(",NaN,NaN,NaN\n"));
   EXPECT_EQ(readDataTable(folder.read("basin.dat")).rows.size(), 40U) << "the results are kept";
   folder.writeGlue("Behavioural_Share = 0.5\nLikelihood = 'equal'", {.restart = 1});
-  folder.useScript("exit 1");
   const ProgramResult run = runProgram({folder / "basin.kdx"});
   ASSERT_EQ(run.exitCode, 0) << run.error;
   EXPECT_THAT(folder.read("basin.log"), HasSubstr("\n40 of them were taken from the earlier run\n"));

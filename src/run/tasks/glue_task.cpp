@@ -67,7 +67,7 @@ const TaskFacts& GlueTask::facts() const {
 }
 
 std::vector<const SectionRow*> GlueTask::sections() const {
-  return {&uncertaintySection().row, &glueSection().row};
+  return {&glueSection().row};
 }
 
 std::vector<std::string> GlueTask::neededSections(const SetupSection& /*target*/) const {
