@@ -65,11 +65,13 @@ inline constexpr RunFile kCorrelation{"_Correlation", ".dat", false, true};
 inline constexpr RunFile kParameterLimits{"_ParameterLimits", ".dat", false, true};
 inline constexpr RunFile kJacobian{"_Jacobian", ".dat", false, true};
 inline constexpr RunFile kSensitivities{"_Sensitivities", ".dat", false, true};
+inline constexpr RunFile kMorris{"_Morris", ".dat", false, true};
 inline constexpr RunFile kQuantiles{"_Quantiles", ".dat", false, true};
 inline constexpr RunFile kSampleCorrelation{"_SampleCorrelation", ".dat", false, true};
 inline constexpr RunFile kGlue{"_Glue", ".dat", false, true};
 inline constexpr std::array kUncertaintyTables{kQuantiles, kSampleCorrelation, kGlue};
-inline constexpr std::array kSensitivityTables{kCovariance, kCorrelation, kParameterLimits, kJacobian, kSensitivities};
+inline constexpr std::array kSensitivityTables{kCovariance, kCorrelation,   kParameterLimits,
+                                               kJacobian,   kSensitivities, kMorris};
 
 /// What all tasks call alike behind their own stem.
 constexpr RunFile restartFile(std::string_view stem) {

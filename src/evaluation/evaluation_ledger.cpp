@@ -238,6 +238,12 @@ void EvaluationLedger::finishRepeated(std::size_t place, EvaluationResult known,
                     isFinalRun_ ? "" : " for its pairs, and further runs are compared with the next successful one",
                     result.failure->reason));
   }
+  if (isFinalRun_ && result.ok() && known.ok() && result.measureValues != known.measureValues) {
+    observer_.urgentWarning(
+        fmt::format("{}, the final model run, was made again and has other results than in its row, "
+                    "which is kept: the model depends on more than its parameters",
+                    progress::nameOfEvaluation(result.number)));
+  }
   replay(place, std::move(known));
 }
 

@@ -21,6 +21,9 @@ struct GlueFolder : ModelFolder {
     editSetup("Upper_Bound = 5.0\n      Transformation_Type = 0\n      Parameter_Type = 0",
               "Upper_Bound = 5.0\n      Transformation_Type = 0\n      Parameter_Type = 1");
     editSetup("Initial_Value = 1.0", "Initial_Value = 2.0");  // of b
+    const std::string text = read("basin.kdx");
+    const auto distributions = text.find("    [PARAMETER_1]\n      Mean_Value");
+    write("basin.kdx", text.substr(0, distributions) + text.substr(text.find("  [/UNCERTAINTY_ESTIMATION]")));
     editSetup("Uncertainty_Type = 1", "Uncertainty_Type = 'GLUE'\n    [GLUE]\n" + keywords + "\n    [/GLUE]");
     return setup;
   }

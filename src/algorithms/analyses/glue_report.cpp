@@ -88,7 +88,12 @@ DataTable weightTable(const EvaluatedSample& sample, const GlueWeights& weights,
     if (!sample.ok[i]) continue;
     std::vector<DataTable::Cell>& row = table.rows.emplace_back();
     row = {std::int64_t{sample.numbers[i]}, judge.valuesOf(sample)[i], std::int64_t{isBehavioural[i] ? 1 : 0}, all[i]};
-    for (const std::vector<double>& column : sample.parameters) row.emplace_back(column[i]);
+  }
+  for (const std::vector<double>& column : sample.parameters) {
+    std::vector<double>& written = table.realColumns.emplace_back();
+    for (std::size_t i = 0; i < sample.size(); ++i) {
+      if (sample.ok[i]) written.push_back(column[i]);
+    }
   }
   return table;
 }

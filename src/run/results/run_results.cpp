@@ -167,15 +167,13 @@ void RunResults::close() {
 }
 
 void RunResults::writeTables(std::span<const DataTable> tables, RunLog& log) const {
-  for (const DataTable& found : tables) {
-    DataTable table = found;
-    table.headLines.insert(table.headLines.begin(), tableHead_.begin(), tableHead_.end());
+  for (const DataTable& table : tables) {
     const std::string path = runFilePath(filePrefix_, table.file);
-    const std::string text = dataTableText(table);
-    std::string reason;
-    if (readTextFile(path, reason) == text) continue;  // of a run that is walked through again
+    const auto content = [&] { return [parts = DataTableParts(table, tableHead_)]() mutable { return parts.next(); }; };
+    if (hasContent(path, content())) continue;  // of a run that is walked through again
     keepEarlierFile(path, log);
-    if (!replaceFile(path, text, reason)) fatalError("Error: Unable to write to " + path, reason);
+    std::string reason;
+    if (!replaceFile(path, content(), reason)) fatalError("Error: Unable to write to " + path, reason);
   }
 }
 

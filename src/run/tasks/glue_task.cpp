@@ -90,7 +90,8 @@ void GlueTask::read(const TaskReading& reading) {
   const auto judge = glueJudge(glue, reading.measures, reading.objectives, refusal);
   if (!judge) own.refuse(refusal);
   judge_ = *judge;
-  distributions_ = readDistributions(reading, section);
+  settings.distributions = readDistributions(reading, section);
+  keepSingleValues(reading);
   if (isOfEarlierRun()) {
     validateFileOpens(glue.earlierFile, kEarlierRunKeyword, own);
     refuseOwnResults(reading, own);
@@ -105,6 +106,21 @@ void GlueTask::read(const TaskReading& reading) {
                  fmt::format("Sobol points fill the space evenly where their number is a power of two: {} or {}",
                              std::bit_floor(size), std::uint64_t{std::bit_floor(size)} * 2));
   }
+}
+
+/// Values that distributions have exactly, such as those of a file.
+void GlueTask::keepSingleValues(const TaskReading& reading) {
+  std::size_t variable = 0;
+  for (const ModelParameter& parameter : reading.parameters) {
+    std::vector<double>& values = singleValues_.emplace_back();
+    if (parameter.parameterType != ParameterType::variable) continue;
+    const std::span<const double> ofParameter = settings.distributions[variable++].singleValues();
+    values.assign(ofParameter.begin(), ofParameter.end());
+  }
+}
+
+std::vector<double> GlueTask::givenValues(std::size_t parameter) const {
+  return parameter < singleValues_.size() ? singleValues_[parameter] : std::vector<double>{};
 }
 
 /// They are taken over by a restart; a fresh start would put them aside before they are read.
@@ -128,28 +144,31 @@ std::string GlueTask::description() const {
                           : fmt::format("Uncertainty analysis: GLUE, {} sampling", samplingName(glue.sampling));
 }
 
-std::vector<std::string> GlueTask::summaryLines(const SearchSpace& /*space*/) const {
-  return {"GLUE, " + behaviouralText(judge_, glue), "GLUE, " + likelihoodText(glue)};
+std::vector<std::string> GlueTask::summaryLines(const SearchSpace& space) const {
+  std::vector<std::string> lines;
+  if (!isOfEarlierRun()) lines = distributionLines(settings.distributions, space);
+  lines.insert(lines.end(), {"GLUE, " + behaviouralText(judge_, glue), "GLUE, " + likelihoodText(glue)});
+  return lines;
 }
 
-std::vector<std::string> GlueTask::warnings(const SearchSpace& /*space*/) const {
-  return {};
+std::vector<std::string> GlueTask::warnings(const SearchSpace& space) const {
+  return isOfEarlierRun() ? std::vector<std::string>() : distributionWarnings(settings.distributions, space);
 }
 
 FeasibleSample GlueTask::drawSample(const Feasibility& feasibility) const {
   UniformGenerator random(randomSeed);
-  const std::size_t dimension = distributions_.size();
+  const std::size_t dimension = settings.distributions.size();
   std::vector<ParameterSet> sets;
   for (const std::vector<double>& point :
        pointsOf(glue.sampling, static_cast<std::size_t>(settings.sampleSize), dimension, random)) {
-    sets.push_back(distributions_.setAt(point));
+    sets.push_back(settings.distributions.setAt(point));
   }
   if (!settings.redrawsInfeasible || !feasibility.isTested()) {
     const auto count = static_cast<std::int64_t>(sets.size());
     return {std::move(sets), count};
   }
   return redrawInfeasible(std::move(sets), feasibility,
-                          [&] { return distributions_.setAt(randomPoint(dimension, random)); });
+                          [&] { return settings.distributions.setAt(randomPoint(dimension, random)); });
 }
 
 void GlueTask::requireSets(const SearchSpace& /*space*/, const Feasibility& feasibility) const {

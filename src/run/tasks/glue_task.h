@@ -6,7 +6,6 @@
 
 #include "algorithms/analyses/glue.h"
 #include "algorithms/analyses/uncertainty.h"
-#include "algorithms/distributions/parameter_distributions.h"
 #include "run/tasks/task.h"
 
 namespace mirevo {
@@ -19,6 +18,7 @@ class GlueTask final : public Task {
   std::vector<const SectionRow*> sections() const override;
   std::vector<std::string> neededSections(const SetupSection& target) const override;
   void read(const TaskReading& reading) override;
+  std::vector<double> givenValues(std::size_t parameter) const override;
   std::string description() const override;
   std::vector<std::string> summaryLines(const SearchSpace& space) const override;
   std::vector<std::string> warnings(const SearchSpace& space) const override;
@@ -37,6 +37,7 @@ class GlueTask final : public Task {
 
  private:
   bool isOfEarlierRun() const { return !glue.earlierFile.empty(); }
+  void keepSingleValues(const TaskReading& reading);
   void refuseOwnResults(const TaskReading& reading, const SetupSection& section) const;
   /// The sets and how many were drawn for them; fewer only if none are redrawn.
   FeasibleSample drawSample(const Feasibility& feasibility) const;
@@ -48,7 +49,7 @@ class GlueTask final : public Task {
   };
   Found find(const TaskContext& context, const EarlierSample& evaluated) const;
 
-  ParameterDistributions distributions_;
+  std::vector<std::vector<double>> singleValues_;  ///< by parameter
   GlueJudge judge_;
 };
 

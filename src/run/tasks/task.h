@@ -120,6 +120,7 @@ struct TaskReport {
   bool hasBands = false;                             ///< it writes bands of simulated series
   bool isGlue = false;                               ///< it writes the weights of GLUE
   const SensitivitySettings* sensitivity = nullptr;  ///< for a local sensitivity analysis, else null
+  bool hasMorris = false;                            ///< it writes the table of a Morris screening
   std::vector<std::string> runNames = {};  ///< of the evaluations, from the first on; empty where one has none
 };
 

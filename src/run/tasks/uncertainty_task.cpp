@@ -4,6 +4,7 @@
 
 #include "algorithms/analyses/sampled_distributions.h"
 #include "run/tasks/analysis_names.h"
+#include "run/tasks/distribution_reading.h"
 #include "run/tasks/infeasible_sets.h"
 #include "run/tasks/sample_bands.h"
 
@@ -18,7 +19,9 @@ const TaskFacts& UncertaintyTask::facts() const {
 }
 
 std::vector<const SectionRow*> UncertaintyTask::sections() const {
-  return {&uncertaintySection().row, &distributionSection().row};
+  std::vector<const SectionRow*> rows{&uncertaintySection().row};
+  for (const SectionRow* row : distributionSections(kUncertaintySection)) rows.push_back(row);
+  return rows;
 }
 
 std::vector<std::string> UncertaintyTask::neededSections(const SetupSection& target) const {
@@ -43,17 +46,18 @@ void UncertaintyTask::read(const TaskReading& reading) {
     section.refuse(kSampleSizeRefusal, kSampleSizeKeyword, fmt::format("{}, found {}", *tooMany, settings.sampleSize));
   }
   section.require(validateBandEnd(settings, reading.period));
-  if (const auto surplus = section.itemBeyond("PARAMETER_", reading.variableCount)) {
-    surplus->warn(surplus->name(),
-                  fmt::format("not read: PARAMETER_n is the distribution of the n-th of the {} variable parameters. "
-                              "If the sections are numbered by model parameter, each one that comes after a fixed or "
-                              "dependent parameter is taken for another parameter's",
-                              reading.variableCount));
+  settings.distributions = readDistributions(reading, section, MissingDistribution::isRefused);
+  std::size_t variable = 0;
+  for (const ModelParameter& parameter : reading.parameters) {
+    std::vector<double>& values = singleValues_.emplace_back();
+    if (parameter.parameterType != ParameterType::variable) continue;
+    const std::span<const double> ofParameter = settings.distributions[variable++].singleValues();
+    values.assign(ofParameter.begin(), ofParameter.end());
   }
-  for (std::size_t i = 0; i < reading.variableCount; ++i) {
-    const SetupSection item = section.openItem("PARAMETER_", i + 1);
-    item.read(distributionSection(), settings.parameters.emplace_back());
-  }
+}
+
+std::vector<double> UncertaintyTask::givenValues(std::size_t parameter) const {
+  return parameter < singleValues_.size() ? singleValues_[parameter] : std::vector<double>{};
 }
 
 std::optional<KeptSteps> UncertaintyTask::keptSteps() const {
@@ -66,21 +70,21 @@ std::string UncertaintyTask::description() const {
 }
 
 std::vector<std::string> UncertaintyTask::summaryLines(const SearchSpace& space) const {
-  return distributionLines(settings, space);
+  return distributionLines(settings.distributions, space);
 }
 
 std::vector<std::string> UncertaintyTask::warnings(const SearchSpace& space) const {
-  return distributionWarnings(settings, space);
+  return distributionWarnings(settings.distributions, space);
 }
 
 void UncertaintyTask::requireSets(const SearchSpace& /*space*/, const Feasibility& feasibility) const {
-  if (!settings.redrawsInfeasible || !feasibility.isTested() || settings.parameters.empty()) return;
-  feasibleUncertaintySample(settings, randomSeed, feasibility, [](std::string_view) {});
+  if (!settings.redrawsInfeasible || !feasibility.isTested() || settings.distributions.size() == 0) return;
+  feasibleUncertaintySample(settings, randomSeed, feasibility);
 }
 
 /// `acceptance`: a line on the sets drawn, if any can be drawn again.
 std::vector<ParameterSet> UncertaintyTask::drawSample(const TaskContext& context, std::string& acceptance) const {
-  if (settings.parameters.empty()) return {};
+  if (settings.distributions.size() == 0) return {};
   const auto messages = [&](std::string_view text) { context.log.line(text); };
   if (!settings.redrawsInfeasible) {
     std::vector<ParameterSet> sample = uncertaintySample(settings, randomSeed, messages);

@@ -230,7 +230,12 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
       {earlier + "'setup_Optimisation.dat'\nEarlier_Result_Sets = 0", "No. of sets of the earlier result file invalid",
        "expected 1 or more, found 0"},
       {"Initial_Sample_Generation = 4 => Initial_Sample_Generation = 4\nEarlier_Result_File = 'other.dat'",
-       "Earlier result file invalid", "expected this or Initial_Sample_Generation = 4, found both"},
+       "Earlier result file invalid",
+       "expected this or Initial_Sample_Generation = 4, found both. Leave out the latter"},
+      {"'sample.txt' => '' & Initial_Sample_Generation = 4 => Initial_Sample_Generation = 4\nEarlier_Result_File = "
+       "'other.dat'",
+       "Earlier result file invalid",
+       "setup.kdx:143:23: Earlier_Result_File: expected this or Initial_Sample_Generation = 4"},
       {"Algorithm_Type = 1 => 'PDDS' & [SURROGATE_MODEL_PARAMETERS] => [X] & [/SURROGATE_MODEL_PARAMETERS] => [/X]",
        "Unable to open section SURROGATE_MODEL_PARAMETERS in KDX file",
        "Use_Surrogate_Model: Parallel Dynamically Dimensioned Search uses no surrogate model: expected 0"},
@@ -339,11 +344,19 @@ std::vector<RowInSetup> rowsInSetups(const std::string& setup) {
       {"SCE_", "0"}, {"DDS_", "2"}, {"PDDS_", "'PDDS'"}, {"OPSE_", "'OPSE'"}};
   std::vector<RowInSetup> found;
   for (const SectionRow* section : setupSchema().sections()) {
+    // Which keywords of these are read depends on others of them: tests/run/tasks/distribution_reading_test.cpp.
+    const bool isOfDistributions = section->path.ends_with("Y_ESTIMATION/PARAMETER_n") ||
+                                   section->path.ends_with("Y_ANALYSIS/PARAMETER_n") ||
+                                   section->path.find("/CORRELATIONS") != std::string_view::npos;
+    if (isOfDistributions) continue;
     std::string text = setup;
     for (const auto& [start, option] : kOptions) {
       if (section->path.starts_with(start)) {
         text = SetupFixture::withValue(text, "MIREVO_SIMULATION_OPTION", "Option", option);
       }
+    }
+    if (section->path.ends_with("/GLUE")) {
+      text = SetupFixture::withValue(text, "UNCERTAINTY_ESTIMATION", "Uncertainty_Type", "'GLUE'");
     }
     for (const auto& [start, algorithm] : kAlgorithms) {
       if (section->path.find(start) == std::string_view::npos) continue;
