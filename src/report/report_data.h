@@ -9,6 +9,7 @@
 
 #include "evaluation/evaluation_result.h"
 #include "report/failure_reasons.h"
+#include "report/report_glue.h"
 #include "report/series_above.h"
 #include "report/series_labels.h"
 #include "run/results/run_record.h"
@@ -106,6 +107,8 @@ struct ReportedBand {
   std::vector<float> runs;  ///< how many are behind the quantiles of each time; empty where the file does not say it
   std::size_t observationCount = 0;  ///< observations with a simulated value
   std::size_t insideCount = 0;       ///< those inside the band
+  double meanWidth = 0.0;            ///< BandCoverage, at the observations; likewise
+  double relativeWidth = 0.0;
   int fewestRuns = 0;                ///< of the times with a band
   int mostRuns = 0;                  ///< where the file does not say it, the runs that succeeded
 };
@@ -179,6 +182,7 @@ struct ReportData {
   std::vector<ShownSeries> wholeSeries;  ///< `series` from the first to the last period; empty without `periods`
   std::vector<ReportedBand> bands;
   std::optional<ReportedSensitivity> sensitivity;
+  std::optional<ReportedGlue> glue;
   std::vector<std::string> summary;  ///< the closing lines of the result file
 };
 

@@ -467,6 +467,11 @@ void ReportBuilder::addAnalyses() {
         band.mostRuns = analysed.value_or(static_cast<int>(std::count(ok.begin(), ok.end(), true)));
     }
   }
+  if (task.isGlue && hasAnalysis) {
+    std::string fault;
+    data_.glue = reportedGlue(filePrefix_, config_.parameters, fault);
+    if (!fault.empty()) note(fmt::format("The weights of GLUE are not shown: {}.", fault));
+  }
   if (task.sensitivity != nullptr) {
     data_.sensitivity = reportedSensitivity(config_, *task.sensitivity, space(), sources_.results.rows, pairsOfRuns());
   }

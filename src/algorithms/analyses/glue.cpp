@@ -241,13 +241,17 @@ GlueWeights glueWeights(const EvaluatedSample& sample, const GlueJudge& judge, c
 GlueSummary summariseGlue(const EvaluatedSample& sample, const GlueWeights& weights, std::int32_t matrixLimit) {
   GlueSummary summary;
   std::vector<std::vector<double>> behavioural;
+  std::vector<std::size_t> succeeded;
+  for (std::size_t i = 0; i < sample.size(); ++i) {
+    if (sample.ok[i]) succeeded.push_back(i);
+  }
   const std::vector<double> equal(sample.size(), 1.0 / static_cast<double>(std::max<std::size_t>(sample.size(), 1)));
   for (const std::vector<double>& column : sample.parameters) {
     behavioural.push_back(pick(column, weights.behavioural));
     GlueParameter& parameter = summary.parameters.emplace_back();
     parameter.drawn = summariseWeighted(column, equal);
     parameter.behavioural = summariseWeighted(behavioural.back(), weights.weights);
-    parameter.distance = distributionDistance(behavioural.back(), weights.weights, column);
+    parameter.distance = distributionDistance(behavioural.back(), weights.weights, pick(column, succeeded));
   }
   summary.measures = summariseColumns(sample.measures, weights);
   summary.objectives = summariseColumns(sample.objectives, weights);
@@ -256,8 +260,7 @@ GlueSummary summariseGlue(const EvaluatedSample& sample, const GlueWeights& weig
   if (sample.parameters.size() <= static_cast<std::size_t>(std::max(matrixLimit, 0))) {
     summary.correlations = weightedCorrelations(behavioural, weights.weights);
   }
-  constexpr double kOneInTwenty = 1.358;
-  summary.distanceLimit = kOneInTwenty * std::sqrt(1.0 / weights.effective + 1.0 / static_cast<double>(sample.size()));
+  summary.distanceLimit = chanceDistance(weights.effective, weights.successCount);
   return summary;
 }
 

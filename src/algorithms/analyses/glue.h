@@ -74,7 +74,7 @@ GlueWeights glueWeights(const EvaluatedSample& sample, const GlueJudge& judge, c
 struct GlueParameter {
   SampleSummary drawn;        ///< of all sets
   SampleSummary behavioural;  ///< of the behavioural ones, weighted
-  double distance = 0.0;      ///< distributionDistance() of the behavioural from the drawn values
+  double distance = 0.0;      ///< distributionDistance() of the behavioural values from those of all that succeeded
 };
 
 struct GlueSummary {
@@ -83,9 +83,8 @@ struct GlueSummary {
   std::vector<SampleSummary> objectives;
   std::vector<SampleSummary> validation;
   std::vector<std::vector<double>> correlations;  ///< of the behavioural sets; empty for too many parameters
-  /// Distances below this one are found in one of twenty samples of as many sets of equal weight whose distribution is
-  /// the one drawn from: 1.358 (1/n + 1/N)^(1/2), n the effective count, N that of the sample (Smirnov 1948,
-  /// doi:10.1214/aoms/1177730256). Regional sensitivity analysis (Spear and Hornberger 1980,
+  /// chanceDistance() of the behavioural sets from all that succeeded: a smaller distance does not tell that the
+  /// observations say anything of the parameter. Regional sensitivity analysis (Spear and Hornberger 1980,
   /// doi:10.1016/0043-1354(80)90040-8) compares the same way.
   double distanceLimit = 0.0;
 };

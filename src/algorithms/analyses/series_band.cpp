@@ -47,33 +47,23 @@ class TimeQuantiles final {
   std::vector<double> values_;
 };
 
-/// Gathers what lies in a band.
-class CoverageCount final {
- public:
-  void add(double observed, double lower, double upper) {
-    count_ += 1.0;
-    if (observed >= lower && observed <= upper) inside_ += 1.0;
-    width_ += (upper - lower - width_) / count_;
-    const double difference = observed - mean_;
-    mean_ += difference / count_;
-    squares_ += difference * (observed - mean_);
-  }
-  BandCoverage found() const {
-    const double deviation = std::sqrt(squares_ / count_);
-    constexpr double kNone = std::numeric_limits<double>::quiet_NaN();
-    return {static_cast<std::size_t>(count_), count_ > 0.0 ? inside_ / count_ : kNone, count_ > 0.0 ? width_ : kNone,
-            deviation > 0.0 ? width_ / deviation : kNone};
-  }
-
- private:
-  double count_ = 0.0;
-  double inside_ = 0.0;
-  double width_ = 0.0;
-  double mean_ = 0.0;     ///< of the observations
-  double squares_ = 0.0;  ///< of their differences to it
-};
-
 }  // namespace
+
+void CoverageCount::add(double observed, double lower, double upper) {
+  count_ += 1.0;
+  if (observed >= lower && observed <= upper) inside_ += 1.0;
+  width_ += (upper - lower - width_) / count_;
+  const double difference = observed - mean_;
+  mean_ += difference / count_;
+  squares_ += difference * (observed - mean_);
+}
+
+BandCoverage CoverageCount::found() const {
+  constexpr double kNone = std::numeric_limits<double>::quiet_NaN();
+  if (count_ == 0.0) return {0, kNone, kNone, kNone};
+  const double deviation = std::sqrt(squares_ / count_);
+  return {static_cast<std::size_t>(count_), inside_ / count_, width_, deviation > 0.0 ? width_ / deviation : kNone};
+}
 
 SeriesBand seriesBand(std::span<const double> observed, std::size_t evaluations, const ReadColumns& read,
                       std::span<const double> weights) {

@@ -22,6 +22,20 @@ struct BandCoverage {
   double relativeWidth = 0.0;
 };
 
+/// Gathers the coverage, one observation after another.
+class CoverageCount final {
+ public:
+  void add(double observed, double lower, double upper);
+  BandCoverage found() const;
+
+ private:
+  double count_ = 0.0;
+  double inside_ = 0.0;
+  double width_ = 0.0;    ///< mean
+  double mean_ = 0.0;     ///< of the observations
+  double squares_ = 0.0;  ///< of their differences to it
+};
+
 /// The 5-95 % band of a simulated series at the times of its observations, and at others without an observed value.
 struct SeriesBand {
   std::vector<double> lower;       ///< 5 % quantile (type 7), one per time; NaN without a simulated value

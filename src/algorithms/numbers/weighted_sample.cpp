@@ -124,4 +124,9 @@ double distributionDistance(std::span<const double> values, std::span<const doub
   return distance;
 }
 
+double chanceDistance(double effective, std::size_t count) {
+  constexpr double kOneInTwenty = 1.358;
+  return kOneInTwenty * std::sqrt(1.0 / effective + 1.0 / static_cast<double>(count));
+}
+
 }  // namespace mirevo

@@ -51,4 +51,8 @@ double effectiveCount(std::span<const double> weights);
 double distributionDistance(std::span<const double> values, std::span<const double> weights,
                             std::span<const double> drawn);
 
+/// The distance that one of twenty pairs of samples of the same distribution exceeds, of `effective` and of `count`
+/// values of equal weight: 1.358 (1/n + 1/N)^(1/2) (Smirnov 1948, doi:10.1214/aoms/1177730256).
+double chanceDistance(double effective, std::size_t count);
+
 }  // namespace mirevo

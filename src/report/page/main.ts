@@ -5,6 +5,7 @@ import { make } from './dom';
 import { nameFilesAfter } from './figure_files';
 import { switchTheme } from './look';
 import { comparisonSection } from './sections/comparisons';
+import { glueSection } from './sections/glue';
 import { historySection } from './sections/histories';
 import { failureSection, head, parameterSection, resultSection, runSection, summarySection } from './sections/overview';
 import { dottySection, goodSetsSection, progressSection } from './sections/search';
@@ -19,6 +20,7 @@ function sections(data: ReportData): Section[] {
   const sampled = task !== 'sensitivity'; // its evaluations vary one parameter at a time
   const all = [
     bandSection(data),
+    glueSection(data),
     sensitivitySection(data),
     validationSection(data),
     seriesSection(data),

@@ -133,7 +133,7 @@ std::vector<std::string> reportBands(const TaskContext& context, const Uncertain
       const BandCoverage unused = coverageOf(band, observed, validation.observed);
       if (unused.observationCount == 0) continue;
       const std::string period = context.validationPeriods[validation.period].name;
-      lines.push_back(coverageText(fmt::format("{} in {}, which judges no set", name, period), unused));
+      lines.push_back(coverageText(fmt::format("{} in {} (validation)", name, period), unused));
       lines.push_back("   " + bandWidthText(unused));
     }
     if (hasSteps) {

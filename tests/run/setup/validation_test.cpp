@@ -357,6 +357,7 @@ std::vector<RowInSetup> rowsInSetups(const std::string& setup) {
     }
     if (section->path.ends_with("/GLUE")) {
       text = SetupFixture::withValue(text, "UNCERTAINTY_ESTIMATION", "Uncertainty_Type", "'GLUE'");
+      text = SetupFixture::withValue(text, "ObjectiveFunctions/OUTPUT_MEASURES/MEASURE_n", "Statistic_Type", "'NSE'");
     }
     for (const auto& [start, algorithm] : kAlgorithms) {
       if (section->path.find(start) == std::string_view::npos) continue;
