@@ -9,6 +9,7 @@
 
 #include "evaluation/evaluation_result.h"
 #include "report/failure_reasons.h"
+#include "report/report_glue.h"
 #include "report/report_morris.h"
 #include "report/report_sobol.h"
 #include "report/series_above.h"
@@ -108,8 +109,10 @@ struct ReportedBand {
   std::vector<float> runs;  ///< how many are behind the quantiles of each time; empty where the file does not say it
   std::size_t observationCount = 0;  ///< observations with a simulated value
   std::size_t insideCount = 0;       ///< those inside the band
-  int fewestRuns = 0;                ///< of the times with a band
-  int mostRuns = 0;                  ///< where the file does not say it, the runs that succeeded
+  double meanWidth = 0.0;            ///< BandCoverage, at the observations; likewise
+  double relativeWidth = 0.0;
+  int fewestRuns = 0;  ///< of the times with a band
+  int mostRuns = 0;    ///< where the file does not say it, the runs that succeeded
 };
 
 /// A parameter without a variance, and why.
@@ -183,6 +186,7 @@ struct ReportData {
   std::optional<ReportedSensitivity> sensitivity;
   std::vector<ReportedScreening> morris;
   std::optional<ReportedSobol> sobol;
+  std::optional<ReportedGlue> glue;
   std::vector<std::string> summary;  ///< the closing lines of the result file
 };
 

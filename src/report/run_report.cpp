@@ -477,6 +477,11 @@ void ReportBuilder::addAnalyses() {
     data_.sobol = reportedSobol(config_, filePrefix_, pairLabels(), faults);
     for (const std::string& fault : faults) note(fault + ".");
   }
+  if (task.isGlue && hasAnalysis) {
+    std::string fault;
+    data_.glue = reportedGlue(filePrefix_, config_.parameters, fault);
+    if (!fault.empty()) note(fmt::format("The weights of GLUE are not shown: {}.", fault));
+  }
   if (task.sensitivity != nullptr) {
     data_.sensitivity = reportedSensitivity(config_, *task.sensitivity, space(), sources_.results.rows, pairsOfRuns());
   }

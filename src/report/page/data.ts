@@ -178,12 +178,35 @@ export interface Band extends Times {
   p95: Maybe[];
   inside: Maybe; // share of the observed values within p5 to p95
   n: Maybe;
+  width?: Maybe; // mean at the observed values
+  relativeWidth?: Maybe; // over the standard deviation of the observed values
   gaps?: number[]; // places before which there is a gap, over which no line is drawn
   observedGaps?: number[];
   runs?: Maybe[]; // how many are behind the quantiles of each time
   fewestRuns?: number;
   mostRuns?: number; // without `runs`: the runs that succeeded
   thinned?: boolean; // reduced to the extremes of short spans; `inside` and `n` are of all values
+}
+
+/** Weights of acceptable sets. Those with a dot are thinned, shares are of all. */
+export interface Glue {
+  choices: string[]; // what is behavioural, and the likelihood
+  succeeded: number;
+  behavioural: number;
+  effective: Maybe; // sets of equal weight that tell as much
+  distanceLimit: Maybe;
+  numbers: number[]; // evaluations with a dot
+  weights: Maybe[];
+  judged: Maybe[];
+  parameters: {
+    name: string;
+    logarithmic: boolean;
+    distance: Maybe; // of the behavioural distribution from that of all sets
+    values: Maybe[]; // of the sets with a dot
+    edges: number[]; // of the bins
+    drawn: number[]; // share of the sets that succeeded, per bin
+    weighed: number[]; // share of the weight
+  }[];
 }
 
 export interface Covariance {
@@ -293,6 +316,7 @@ export interface ReportData {
   sensitivity: Sensitivity | null;
   morris: Screening[];
   sobol?: Sobol | null;
+  glue?: Glue | null;
   summary: string[];
 }
 

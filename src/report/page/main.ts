@@ -5,6 +5,7 @@ import { make } from './dom';
 import { nameFilesAfter } from './figure_files';
 import { switchTheme } from './look';
 import { comparisonSection } from './sections/comparisons';
+import { glueSection } from './sections/glue';
 import { historySection } from './sections/histories';
 import { morrisSection } from './sections/morris';
 import { failureSection, head, parameterSection, resultSection, runSection, summarySection } from './sections/overview';
@@ -21,6 +22,7 @@ function sections(data: ReportData): Section[] {
   const sampled = task !== 'sensitivity' || data.sobol; // a local analysis varies one parameter at a time
   const all = [
     bandSection(data),
+    glueSection(data),
     sensitivitySection(data),
     morrisSection(data),
     sobolSection(data),

@@ -111,7 +111,9 @@ function runsNote({ runs, fewestRuns, mostRuns }: Band): string {
 
 function coverageNote(band: Band): string {
   if (band.n === 0) return 'No observed value has a simulated one at its time.';
-  return `${percent(band.inside)} of ${band.n === null ? 'the' : count(band.n)} observed values lie within the band.`;
+  const width = band.width == null ? '' : ` It is ${number(band.width)}${band.unit ? ` ${band.unit}` : ''} wide on average at them${
+    band.relativeWidth == null ? '' : `, ${number(band.relativeWidth, 3)} of their standard deviation`}.`;
+  return `${percent(band.inside)} of ${band.n === null ? 'the' : count(band.n)} observed values lie within the band.${width}`;
 }
 
 function bandPlan(band: Band, period: [number, number] | null): ChartPlan {
