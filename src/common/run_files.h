@@ -67,7 +67,8 @@ inline constexpr RunFile kJacobian{"_Jacobian", ".dat", false, true};
 inline constexpr RunFile kSensitivities{"_Sensitivities", ".dat", false, true};
 inline constexpr RunFile kQuantiles{"_Quantiles", ".dat", false, true};
 inline constexpr RunFile kSampleCorrelation{"_SampleCorrelation", ".dat", false, true};
-inline constexpr std::array kUncertaintyTables{kQuantiles, kSampleCorrelation};
+inline constexpr RunFile kSampleSensitivities{"_SampleSensitivities", ".dat", false, true};
+inline constexpr std::array kUncertaintyTables{kQuantiles, kSampleCorrelation, kSampleSensitivities};
 inline constexpr std::array kSensitivityTables{kCovariance, kCorrelation, kParameterLimits, kJacobian, kSensitivities};
 
 /// What all tasks call alike behind their own stem.

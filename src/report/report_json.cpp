@@ -11,6 +11,7 @@
 #include "report/drawn_lines.h"
 #include "report/hydrograph_views.h"
 #include "report/json_writer.h"
+#include "report/report_sample.h"
 #include "report/report_validation.h"
 #include "report/thinning.h"
 
@@ -375,6 +376,7 @@ std::string reportJson(const ReportData& data) {
   writeValidation(json, data);
   writeBands(json, data);
   if (data.sensitivity) writeSensitivity(json, *data.sensitivity);
+  writeSample(json, data);
   json.member("summary", data.summary).endObject();
   return json.take();
 }

@@ -32,6 +32,7 @@
 #include "report/report_analyses.h"
 #include "report/report_file.h"
 #include "report/report_parameters.h"
+#include "report/report_sample.h"
 #include "report/report_validation.h"
 #include "report/run_sources.h"
 #include "run/results/restart_settings.h"
@@ -466,6 +467,12 @@ void ReportBuilder::addAnalyses() {
       if (band.runs.empty())
         band.mostRuns = analysed.value_or(static_cast<int>(std::count(ok.begin(), ok.end(), true)));
     }
+  }
+  if (task.distributions != nullptr) data_.distributions = reportedDistributions(*task.distributions, space());
+  if (task.distributions != nullptr && hasAnalysis) {
+    std::string fault;
+    data_.sampleSensitivity = reportedSampleSensitivity(filePrefix_, space().names, fault);
+    if (!fault.empty()) note(fault + ".");
   }
   if (task.sensitivity != nullptr) {
     data_.sensitivity = reportedSensitivity(config_, *task.sensitivity, space(), sources_.results.rows, pairsOfRuns());

@@ -8,6 +8,7 @@ import { comparisonSection } from './sections/comparisons';
 import { historySection } from './sections/histories';
 import { failureSection, head, parameterSection, resultSection, runSection, summarySection } from './sections/overview';
 import { dottySection, goodSetsSection, progressSection } from './sections/search';
+import { sampleSection } from './sections/sample';
 import type { Section } from './sections/section';
 import { sensitivitySection } from './sections/sensitivity';
 import { seriesSection } from './sections/series';
@@ -20,6 +21,7 @@ function sections(data: ReportData): Section[] {
   const all = [
     bandSection(data),
     sensitivitySection(data),
+    sampleSection(data),
     validationSection(data),
     seriesSection(data),
     parameterSection(data),

@@ -28,6 +28,7 @@
 
 namespace mirevo {
 
+class ParameterDistributions;
 struct SensitivitySettings;
 
 /// A form of a task and the keyword that selects it.
@@ -107,11 +108,12 @@ struct TaskOutcome {
 
 /// What a report shows of a task besides its evaluations.
 struct TaskReport {
-  std::string algorithm = {};                        ///< the name of the search: "DDS"; empty: none
-  std::string surrogate = {};                        ///< the surrogate model that assists it; empty: none
-  int populationSize = 0;                            ///< 0: none
-  bool hasBands = false;                             ///< it writes bands of simulated series
-  const SensitivitySettings* sensitivity = nullptr;  ///< for a local sensitivity analysis, else null
+  std::string algorithm = {};                             ///< the name of the search: "DDS"; empty: none
+  std::string surrogate = {};                             ///< the surrogate model that assists it; empty: none
+  int populationSize = 0;                                 ///< 0: none
+  bool hasBands = false;                                  ///< it writes bands of simulated series
+  const SensitivitySettings* sensitivity = nullptr;       ///< for a local sensitivity analysis, else null
+  const ParameterDistributions* distributions = nullptr;  ///< from which the sets were drawn; null: none
   std::vector<std::string> runNames = {};  ///< of the evaluations, from the first on; empty where one has none
 };
 
