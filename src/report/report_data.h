@@ -148,6 +148,24 @@ struct ReportedSensitivity {
   std::optional<ReportedCovariance> covariance;
 };
 
+/// The distribution from which the values of a variable parameter were drawn.
+struct ReportedDistribution {
+  std::string text;               ///< "triangular, from 1 to 5, mode 2"
+  std::vector<double> quantiles;  ///< at equal steps of the probability from half a step on, on the model scale
+};
+
+/// What a sample tells of its parameters, see algorithms/analyses/sample_sensitivity.
+struct ReportedSampleSensitivity {
+  std::vector<std::string> parameters;
+  std::vector<std::string> outputs;
+  std::vector<std::string> kinds;                     ///< of the outputs, "measure" or "objective"
+  std::vector<std::vector<double>> rankCorrelations;  ///< a row of each parameter, a column of each output
+  std::vector<std::vector<double>> firstOrder;
+  std::vector<std::vector<double>> lower;
+  std::vector<std::vector<double>> upper;
+  bool areCorrelated = false;  ///< the parameters
+};
+
 /// The evaluation period or a validation period.
 struct ReportedPeriod {
   std::string name;
@@ -187,6 +205,8 @@ struct ReportData {
   std::vector<ReportedScreening> morris;
   std::optional<ReportedSobol> sobol;
   std::optional<ReportedGlue> glue;
+  std::vector<ReportedDistribution> distributions;  ///< one per variable parameter, or none at all
+  std::optional<ReportedSampleSensitivity> sampleSensitivity;
   std::vector<std::string> summary;  ///< the closing lines of the result file
 };
 

@@ -297,6 +297,23 @@ export interface Sobol {
   series: SobolSeries[];
 }
 
+/** From which the values of a variable parameter were drawn. */
+export interface Distribution {
+  text: string;
+  quantiles: Maybe[]; // at equal steps of the probability from half a step on
+}
+
+export interface SampleSensitivity {
+  parameters: string[];
+  outputs: string[];
+  kinds: string[]; // of the outputs, 'measure' or 'objective'
+  rankCorrelations: Maybe[][]; // one row per parameter, one column per output
+  firstOrder: Maybe[][];
+  lower: Maybe[][]; // 95 % limits
+  upper: Maybe[][];
+  areCorrelated: boolean; // the parameters
+}
+
 export interface ReportData {
   format: number;
   program: string;
@@ -317,6 +334,8 @@ export interface ReportData {
   morris: Screening[];
   sobol?: Sobol | null;
   glue?: Glue | null;
+  distributions?: Distribution[]; // one per variable parameter, or none
+  sampleSensitivity?: SampleSensitivity | null;
   summary: string[];
 }
 
