@@ -11,6 +11,7 @@ int main(int argc, char** argv) {
       {"uncertainty", {.option = 3, .maxEvaluations = 60, .modelArguments = "--fail-above 6"}},
       {"glue", {.option = 3, .maxEvaluations = 120, .modelArguments = "--fail-above 9.5"}},
       {"sensitivity", {.option = 1}},
+      {"screening", {.option = 1}},
       {"sobol", {.option = 1}},
       {"scenarios", {.option = 0, .scenarios = scenarios(30)}},
       {"allFailed", {.option = 0, .scenarios = scenarios(30), .modelArguments = "--fail-above -1"}}};
@@ -18,6 +19,7 @@ int main(int argc, char** argv) {
   for (const auto& [name, settings] : samples) {
     const ModelFolder folder;
     const std::string setup = folder.writeSetup(settings);
+    if (name == "screening") folder.editSetup("Sensitivity_Type = 0", "Sensitivity_Type = 'Morris'");
     if (name == "sobol") {
       folder.editSetup("Sensitivity_Type = 0",
                        "Sensitivity_Type = 'Sobol'\n[SOBOL]\nSample_Size = 64\nSecond_Order = 1\n[/SOBOL]");
