@@ -40,3 +40,9 @@ grep -q '^# *1\. X4 ' "$folder/sensitivity_Sensitivity.dat"
 grep -q '^# Standard error of a residual: 11\.7' "$folder/sensitivity_Sensitivity.dat"
 awk -F '\t' '$1 == 2 { found = $9 > 11.7 && $9 < 11.8 } END { exit !found }' "$folder/scenarios.dat"
 test "$(wc -l <"$folder/uncertainty_Band_1.csv")" -eq 3289
+
+# A few blocks of the Sobol' analysis: 256 model runs.
+sed 's/Sample_Size    = .*/Sample_Size    = 32/' "$3/sobol.kdx" >"$folder/sobol.kdx"
+VOLK_PROGRESS=NONE "$1" "$folder/sobol.kdx" || { cat "$folder/sobol.log"; exit 1; }
+test "$(grep -c '^objective	Discharge	.*	total	' "$folder/sobol_Sobol.dat")" -eq 6
+test "$(wc -l <"$folder/sobol_SobolSeries_1.csv")" -eq 3289

@@ -355,6 +355,9 @@ std::vector<RowInSetup> rowsInSetups(const std::string& setup) {
         text = SetupFixture::withValue(text, "MIREVO_SIMULATION_OPTION", "Option", option);
       }
     }
+    if (section->path.ends_with("/SOBOL")) {
+      text = SetupFixture::withValue(text, "SENSITIVITY_ANALYSIS", "Sensitivity_Type", "'Sobol'");
+    }
     for (const auto& [start, algorithm] : kAlgorithms) {
       if (section->path.find(start) == std::string_view::npos) continue;
       text = SetupFixture::withValue(text, "OPTIMISATION_ALGORITHM", "Algorithm_Type", algorithm);
