@@ -210,6 +210,35 @@ export interface Sensitivity {
   covariance: Covariance | null;
 }
 
+/** A statistic with its limits (95 %): value, lower, upper. */
+export type Limited = [Maybe, Maybe, Maybe];
+
+export interface EffectsOfParameter {
+  name: string;
+  mu: Limited;
+  muStar: Limited;
+  sigma: Limited;
+  share: Limited; // of the largest mu*
+  effects: number;
+  rank: number; // 0: none
+  rankLower: number;
+  rankUpper: number;
+  rankStability: Maybe; // share of the bootstrap samples with this rank
+  certainty: Maybe; // that the share is negligible
+  verdict: 'fix' | 'keep' | 'undecided' | null;
+}
+
+/** A Morris screening for one output. */
+export interface Screening {
+  kind: 'objective' | 'measure' | 'validation';
+  name: string;
+  negligible: number; // share of the largest mu*
+  topCount: number; // parameters that are not negligible by their values
+  topStability: Maybe;
+  fixedTogether: Maybe;
+  parameters: EffectsOfParameter[];
+}
+
 /** An index, the limits that hold it with 95 %, and the blocks of the design that it is of. */
 export type SobolIndex = [Maybe, Maybe, Maybe, number];
 
@@ -262,6 +291,7 @@ export interface ReportData {
   validation?: Validation | null;
   band: Band[];
   sensitivity: Sensitivity | null;
+  morris: Screening[];
   sobol?: Sobol | null;
   summary: string[];
 }
@@ -289,6 +319,7 @@ export function readReportData(text: string): ReportData {
     series: list(data.series),
     band: list(data.band),
     sensitivity: data.sensitivity ?? null,
+    morris: list(data.morris),
     summary: list(data.summary),
   };
 }

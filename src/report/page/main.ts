@@ -6,6 +6,7 @@ import { nameFilesAfter } from './figure_files';
 import { switchTheme } from './look';
 import { comparisonSection } from './sections/comparisons';
 import { historySection } from './sections/histories';
+import { morrisSection } from './sections/morris';
 import { failureSection, head, parameterSection, resultSection, runSection, summarySection } from './sections/overview';
 import { dottySection, goodSetsSection, progressSection } from './sections/search';
 import type { Section } from './sections/section';
@@ -21,6 +22,7 @@ function sections(data: ReportData): Section[] {
   const all = [
     bandSection(data),
     sensitivitySection(data),
+    morrisSection(data),
     sobolSection(data),
     validationSection(data),
     seriesSection(data),
