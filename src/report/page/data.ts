@@ -272,7 +272,7 @@ export interface SobolOutput {
   total: SobolIndex[];
   interactions: SobolIndex[];
   sumOfFirst: SobolIndex[]; // one
-  second: Maybe[][]; // of each two factors, above the diagonal; empty where it was not asked for
+  second: Maybe[][]; // of each two factors; empty where it was not asked for
   rows: number[]; // sizes of the sample
   stages: { total: SobolIndex[] }[]; // one per size
 }

@@ -21,6 +21,7 @@ int main(int argc, char** argv) {
     const std::string setup = folder.writeSetup(settings);
     if (name == "screening") folder.editSetup("Sensitivity_Type = 0", "Sensitivity_Type = 'Morris'");
     if (name == "sobol") {
+      folder.editSetup("Parameter_Type = 1", "Parameter_Type = 0");
       folder.editSetup("Sensitivity_Type = 0",
                        "Sensitivity_Type = 'Sobol'\n[SOBOL]\nSample_Size = 64\nSecond_Order = 1\n[/SOBOL]");
     }
