@@ -360,6 +360,10 @@ std::vector<RowInSetup> rowsInSetups(const std::string& setup) {
         text = SetupFixture::withValue(text, "MIREVO_SIMULATION_OPTION", "Option", option);
       }
     }
+    if (section->path.ends_with("/GLUE")) {
+      text = SetupFixture::withValue(text, "UNCERTAINTY_ESTIMATION", "Uncertainty_Type", "'GLUE'");
+      text = SetupFixture::withValue(text, "ObjectiveFunctions/OUTPUT_MEASURES/MEASURE_n", "Statistic_Type", "'NSE'");
+    }
     for (const auto& [start, algorithm] : kAlgorithms) {
       if (section->path.find(start) == std::string_view::npos) continue;
       text = SetupFixture::withValue(text, "OPTIMISATION_ALGORITHM", "Algorithm_Type", algorithm);
