@@ -58,7 +58,7 @@ function rankedPlan(screening: Screening): ChartPlan {
   const threshold = screening.negligible * largest;
   return {
     title: 'Parameters by \u03bc*, with limits (95 %)',
-    note: `The change of the output for the whole range of a parameter. The dashed line is ${percent(screening.negligible)} of the largest; what is wholly to its left is negligible.${all.length > order.length ? ` The first ${count(order.length)} of ${count(all.length)} parameters.` : ''}`,
+    note: `The change of the output for the whole range of a parameter. The dashed line is ${percent(screening.negligible)} of the largest; the verdicts above count how uncertain the largest is, too.${all.length > order.length ? ` The first ${count(order.length)} of ${count(all.length)} parameters.` : ''}`,
     height: 56 + Math.max(16, Math.min(30, 900 / order.length)) * order.length,
     option: (look) => ({
       grid: { left: 24, right: 24, top: 4, bottom: 16 },
