@@ -47,6 +47,9 @@ inline constexpr RunFile kScenarioSeries{"_ScenarioSeries", ".dat"};
 inline constexpr RunFile kReport{
     .stem = "_Report", .extension = ".html", .mark = "content=\"default-src 'none'; script-src"};
 inline constexpr RunFile kBand{.stem = "_Band_", .extension = ".csv", .isNumbered = true, .mark = "# Band of "};
+/// Beside a band of the simulated values: that of what would be observed, with the errors.
+inline constexpr RunFile kTotalBand{
+    .stem = "_TotalBand_", .extension = ".csv", .isNumbered = true, .mark = "# Band of "};
 inline constexpr RunFile kSavedFolder{"_Saved", ""};
 /// These two stand beside the setup, or in the folder that it names for them.
 inline constexpr RunFile kFailedFolder{"_Failed", "", true};
@@ -67,7 +70,12 @@ inline constexpr RunFile kJacobian{"_Jacobian", ".dat", false, true};
 inline constexpr RunFile kSensitivities{"_Sensitivities", ".dat", false, true};
 inline constexpr RunFile kQuantiles{"_Quantiles", ".dat", false, true};
 inline constexpr RunFile kSampleCorrelation{"_SampleCorrelation", ".dat", false, true};
-inline constexpr std::array kUncertaintyTables{kQuantiles, kSampleCorrelation};
+inline constexpr RunFile kChains{"_Chains", ".dat", false, true};
+inline constexpr RunFile kPosterior{"_Posterior", ".dat", false, true};
+inline constexpr RunFile kMarginals{"_Marginals", ".dat", false, true};
+inline constexpr RunFile kConvergence{"_Convergence", ".dat", false, true};
+inline constexpr std::array kUncertaintyTables{kQuantiles, kSampleCorrelation, kChains,
+                                               kPosterior, kMarginals,         kConvergence};
 inline constexpr std::array kSensitivityTables{kCovariance, kCorrelation, kParameterLimits, kJacobian, kSensitivities};
 
 /// What all tasks call alike behind their own stem.

@@ -122,9 +122,11 @@ void RunResults::warnOfLostRows(RunLog& log) const {
 }
 
 std::vector<std::string> RunResults::bandPaths(const RunConfig& config) const {
-  std::vector<std::string> paths(config.task->report().hasBands ? config.measures.size() : 0);
-  int number = 0;
-  for (std::string& path : paths) path = runFilePath(filePrefix_, run_files::kBand, ++number);
+  std::vector<std::string> paths;
+  const int count = config.task->report().hasBands ? static_cast<int>(config.measures.size()) : 0;
+  for (const RunFile& file : {run_files::kBand, run_files::kTotalBand}) {
+    for (int number = 1; number <= count; ++number) paths.push_back(runFilePath(filePrefix_, file, number));
+  }
   return paths;
 }
 
@@ -182,12 +184,13 @@ void RunResults::writeTables(std::span<const DataTable> tables, RunLog& log) con
 /// Those of every measure that earlier runs had.
 std::vector<std::string> RunResults::earlierBands(RunLog& log) const {
   std::vector<std::string> paths;
-  const std::string beginning = runFilePath(filePrefix_, run_files::kBand);
-  for (const auto& [path, digits] : numberedEntries(beginning, run_files::kBand.extension)) {
-    std::string reason;
-    const auto head = readFileHead(path, reason);
-    if (!head) log.warning(fmt::format("{}: {}. It may be a band of an earlier run, and is not kept", path, reason));
-    if (head && head->starts_with(run_files::kBand.mark)) paths.push_back(path);
+  for (const RunFile& file : {run_files::kBand, run_files::kTotalBand}) {
+    for (const auto& [path, digits] : numberedEntries(runFilePath(filePrefix_, file), file.extension)) {
+      std::string reason;
+      const auto head = readFileHead(path, reason);
+      if (!head) log.warning(fmt::format("{}: {}. It may be a band of an earlier run, and is not kept", path, reason));
+      if (head && head->starts_with(file.mark)) paths.push_back(path);
+    }
   }
   std::sort(paths.begin(), paths.end());
   return paths;

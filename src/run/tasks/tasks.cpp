@@ -1,5 +1,6 @@
 #include "run/tasks/tasks.h"
 
+#include "run/tasks/dream_task.h"
 #include "run/tasks/optimisation_task.h"
 #include "run/tasks/scenario_task.h"
 #include "run/tasks/sensitivity_task.h"
@@ -25,7 +26,7 @@ const ChoiceTable<Task>& tasks() {
 
 std::vector<std::unique_ptr<Task>> furtherTaskForms() {
   /// A new form of a task is added here, and its name to the codes of the keyword that selects it.
-  return oneOfEach<>();
+  return oneOfEach<DreamTask>();
 }
 
 std::unique_ptr<Task> selectedForm(const Task& task, const SetupSection& target) {
