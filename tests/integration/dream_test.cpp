@@ -55,15 +55,12 @@ Expected linearModel() {
   return {std::sqrt(squares / determinant), std::sqrt(one / determinant), -sum / std::sqrt(one * squares)};
 }
 
-TEST(Dream, ThePosteriorOfALinearModelIsTheOneInClosedFormWhateverTheSlots) {
+TEST(Dream, ThePosteriorOfALinearModelIsTheOneInClosedForm) {
   const ModelFolder folder;
-  const std::string dream = "Likelihood = 'normal'\n Error_Deviation = 3.0\n Effective_Size = 250\n R_Hat_Limit = 1.1";
-  const auto run = [&](int slots) {
-    const ProgramResult result = runProgram({writeDream(folder, {.maxEvaluations = 3000, .slots = slots}, dream)});
-    EXPECT_EQ(result.exitCode, 0) << result.error;
-    return folder.read("basin_Chains.dat");
-  };
-  const std::string chains = run(1);
+  const std::string dream = "Likelihood = 'normal'\n Error_Deviation = 3.0\n Effective_Size = 60\n R_Hat_Limit = 1.2";
+  const ProgramResult result = runProgram({writeDream(folder, {.maxEvaluations = 1500}, dream)});
+  ASSERT_EQ(result.exitCode, 0) << result.error;
+  const std::string chains = folder.read("basin_Chains.dat");
   const std::string posterior = folder.read("basin_Posterior.dat");
   const Expected expected = linearModel();
   for (const auto& [name, mean, deviation] :
@@ -72,7 +69,7 @@ TEST(Dream, ThePosteriorOfALinearModelIsTheOneInClosedFormWhateverTheSlots) {
     EXPECT_NEAR(cell(posterior, name, "Mean"), mean, error);
     EXPECT_NEAR(cell(posterior, name, "Standard deviation"), deviation, error);
   }
-  EXPECT_NEAR(cell(folder.read("basin_SampleCorrelation.dat"), "a", "b"), expected.correlation, 0.2);
+  EXPECT_NEAR(cell(folder.read("basin_SampleCorrelation.dat"), "a", "b"), expected.correlation, 0.4);
   // The rows of the chains: natural logarithm of the normal density of 365 errors, at the states' own evaluations.
   const ReadTable table = readDataTable(chains);
   const ReadTable results = readDataTable(folder.read("basin.dat"));
@@ -84,10 +81,11 @@ TEST(Dream, ThePosteriorOfALinearModelIsTheOneInClosedFormWhateverTheSlots) {
   EXPECT_EQ(row[*table.column("a")], results.rows[number - 1][*results.column("a")]);
 
   const std::string log = folder.read("basin.log");
-  EXPECT_THAT(log, HasSubstr("The chains have converged"));
-  EXPECT_THAT(log, HasSubstr("Burn-in: the first "));
-  EXPECT_THAT(log, HasSubstr("Band of parameter uncertainty of flow: 100.0 % of 365 observations"));
-  EXPECT_THAT(log, HasSubstr("Band of total uncertainty of flow: 100.0 % of 365 observations"));
+  for (const char* const text : {"The chains have converged", "Burn-in: the first ",
+                                 "Band of parameter uncertainty of flow: 100.0 % of 365 observations",
+                                 "Band of total uncertainty of flow: 100.0 % of 365 observations"}) {
+    EXPECT_NE(log.find(text), std::string::npos) << text;  // without the whole log
+  }
   // The total band is 2 * 1.645 * 3 wide.
   std::istringstream band(folder.read("basin_TotalBand_1.csv"));
   double width = 0.0;
@@ -97,11 +95,10 @@ TEST(Dream, ThePosteriorOfALinearModelIsTheOneInClosedFormWhateverTheSlots) {
       width += (values[3] - values[1]) / 365.0;
     }
   }
-  EXPECT_NEAR(width, 2.0 * 1.645 * 3.0, 0.6);
-  EXPECT_EQ(readDataTable(run(3)).rows, table.rows);
+  EXPECT_NEAR(width, 2.0 * 1.645 * 3.0, 0.8);
 }
 
-TEST(Dream, AnInterruptedRunHasThePosteriorOfItsGenerationsAndGoesOnToTheSameBits) {
+TEST(Dream, AnInterruptedRunHasThePosteriorOfItsGenerationsAndGoesOnToTheSameBitsInOtherSlots) {
   const ModelFolder folder;
   const std::string dream = "Likelihood = 'AR(1)'\n Error_Deviation = 0.5, 5.0";
   const RunSettings settings{.maxEvaluations = 200, .restart = 2};
@@ -114,7 +111,9 @@ TEST(Dream, AnInterruptedRunHasThePosteriorOfItsGenerationsAndGoesOnToTheSameBit
   other.useScript("test -e '" + other / "sound" + "' || test ! -e '" + other / "stop" + "' || exit 3\n" +
                   "echo . >> '" + other / "count" + "'; test $(wc -l < '" + other / "count" + "') -lt 152 || touch '" +
                   other / "stop" + "'");
-  const std::string setup = writeDream(other, settings, dream);
+  RunSettings twoSlots = settings;
+  twoSlots.slots = 2;
+  const std::string setup = writeDream(other, twoSlots, dream);
   EXPECT_EQ(runProgram({setup}).exitCode, 1);
   EXPECT_THAT(other.read("basin_Posterior.dat"), HasSubstr("Unfinished run"));
   other.write("sound", "");
