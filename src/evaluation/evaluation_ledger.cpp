@@ -217,6 +217,9 @@ void EvaluationLedger::tellOfRun(const EvaluationResult& result, std::string_vie
   if (!leftBehind.empty()) observer_.processesLeft(std::string(front).append(leftBehind));
   warnOfUnusedObservations(result);
   for (const std::string& text : result.warnings) observer_.warning(front + text);
+  for (const FileDoubt& doubt : result.doubts) {
+    if (toldDoubts_.emplace(doubt.file, doubt.place).second) observer_.warning(front + doubt.text);
+  }
   for (const UnkeptFile& file : result.absentFiles) observer_.fileAbsent(file.name, front + file.reason);
 }
 

@@ -108,6 +108,7 @@ void SetupCheck::judgeRun(ModelRunner& runner, ProcessLauncher& launcher, std::s
   const EvaluationResult result = resultOf(runner, launcher, set);
   print(fmt::format("It took {:.2f} s, with the reading of its results", runTimeClock() - began));
   for (const std::string& text : result.warnings) log_.warning(text);
+  for (const FileDoubt& doubt : result.doubts) log_.warning(doubt.text);
   for (const UnusedObservations& unused : result.unusedObservations) log_.warning(unused.text);
   if (const std::string left = launcher.leftBehind(1); !left.empty()) log_.warning(left);
   if (result.ok()) return printResult(result, runner);

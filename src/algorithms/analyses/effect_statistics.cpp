@@ -157,6 +157,7 @@ class Statistics {
     takeValues();
     shares_.assign(columns_.size(), std::vector<bool>(resamples_.size()));
     muStars_.assign(resamples_.size(), std::vector<float>(columns_.size()));
+    takeLargest();
     for (std::size_t first = 0; first < columns_.size(); first += kBlock) resampleBlock(first);
     rankSamples();
     judgeTogether();
@@ -165,6 +166,7 @@ class Statistics {
 
  private:
   void takeValues();
+  void takeLargest();
   void resampleBlock(std::size_t first);
   void takeReplicates(std::size_t j, std::vector<Sums>& sums);
   void takeShare(std::size_t j, std::span<const Sums> sums);
@@ -177,6 +179,7 @@ class Statistics {
   std::vector<Column> columns_;
   std::optional<std::size_t> reference_;  ///< the parameter with the largest mu*
   std::vector<Sums> referenceSums_;       ///< in each sample
+  std::vector<double> largest_;           ///< mu* of all parameters in each sample
   Sums referenceSum_;                     ///< in that of all effects
   OutputEffects found_;
   std::vector<std::vector<bool>> shares_;    ///< by parameter, which samples agree that its share is negligible
@@ -240,6 +243,22 @@ void Statistics::takeValues() {
   for (const std::vector<std::uint16_t>& sample : resamples_) {
     weights.assign(sample.begin(), sample.end());
     referenceSums_.push_back(sumsOf(c, weights));
+  }
+}
+
+void Statistics::takeLargest() {
+  largest_.assign(resamples_.size(), 0.0);
+  for (const Column& c : columns_) {
+    if (c.count == 0.0) continue;
+    for (std::size_t b = 0; b < resamples_.size(); ++b) {
+      double n = 0.0;
+      double sum = 0.0;
+      for (std::size_t t = 0; t < c.known.size(); ++t) {
+        n += resamples_[b][t] * c.known[t];
+        sum += resamples_[b][t] * c.absolute[t];
+      }
+      if (n > 0.0) largest_[b] = std::max(largest_[b], c.muStar + sum / n);
+    }
   }
 }
 
@@ -321,7 +340,7 @@ void Statistics::takeShare(std::size_t j, std::span<const Sums> sums) {
     if (sums[b].n < 2.0 || referenceSums_[b].n < 2.0) continue;
     const double muStar = std::max(0.0, c.muStar + sums[b].absolute / sums[b].n);
     const double other = reference.muStar + referenceSums_[b].absolute / referenceSums_[b].n;
-    const double value = muStar / other;
+    const double value = muStar / largest_[b];
     const double deviation = std::log(value) - logShare;
     const double ofSample = shareError(sums[b], muStar, other, referenceSums_[b]);
     const bool hasError = hasErrors && share.add(value, deviation, ofSample);

@@ -58,13 +58,14 @@ Resamples drawResamples(std::size_t trajectories, std::size_t samples, std::int3
 
 /// Effects of a parameter below which there are no limits of mu, mu* and the share, and none of sigma.
 inline constexpr std::size_t kFewestEffects = 5;
-inline constexpr std::size_t kFewestEffectsForSigma = 10;
+inline constexpr std::size_t kFewestEffectsForSigma = 8;
 
 /// mu, mu* and sigma (Morris 1991; Campolongo, Cariboni and Saltelli 2007, doi:10.1016/j.envsoft.2006.10.004), with the
 /// limits of the studentised bootstrap (Efron and Tibshirani 1993, 12.5) over whole trajectories: the percentile
-/// interval of a few effects is too narrow. sigma and the share are resampled as logarithms; the standard error of the
-/// share is linearised, its largest mu* is that of the same parameter in all samples. Where more than 1 % of the
-/// samples have no standard error, as few effects differ from one value, limits comprise those of the percentiles, too.
+/// interval of a few effects is too narrow. sigma and the share are resampled as logarithms. The share of a sample is
+/// that of its own largest mu*, so that limits know by how much the largest of several is too large; its standard error
+/// is linearised, with the parameter that has the largest of all. Where more than 1 % of the samples have no standard
+/// error, as few effects differ from one value, limits comprise those of the percentiles, too.
 OutputEffects effectStatistics(const EffectRows& effects, const Resamples& resamples, double negligibleShare);
 
 }  // namespace mirevo

@@ -53,7 +53,8 @@ class Planner {
   }
 
  private:
-  struct Candidate {
+  /// A trajectory on levels.
+  struct Chain {
     std::vector<std::uint8_t> level;
     std::vector<std::uint32_t> order;
     std::vector<float> centroid;
@@ -74,9 +75,9 @@ class Planner {
   bool takeBase(std::vector<double>& base);
   void stepFromBase(EffectTrajectory& trajectory, std::size_t j, double target);
   void planChains();
-  Candidate drawCandidate();
-  std::vector<std::size_t> mostDifferent(std::span<const Candidate> candidates) const;
-  void follow(const Candidate& candidate);
+  std::vector<Chain> drawChains();
+  static double spreadOf(std::span<const Chain> chains, double enough);
+  void follow(const Chain& chain);
   double ofLevel(int level) const { return (level + 0.5) / settings_.levels; }
   int stepped(int level) const {
     return level < settings_.levels / 2 ? level + settings_.levels / 2 : level - settings_.levels / 2;
@@ -194,8 +195,14 @@ void Planner::stepFromBase(EffectTrajectory& trajectory, std::size_t j, double t
 void Planner::planRadial() {
   const auto r = static_cast<std::size_t>(settings_.trajectories);
   const std::size_t p = size();
-  const UnitPoints points =
+  UnitPoints points =
       2 * p <= kMaxSobolDimension ? scrambledSobol(r, 2 * p, random_) : latinHypercube(r, 2 * p, random_);
+  for (std::size_t j = p; j < 2 * p; ++j) {
+    for (std::size_t left = r; left > 1; --left) {
+      const auto pick = static_cast<std::size_t>(random_.next() * static_cast<double>(left));
+      std::swap(points[left - 1][j], points[pick][j]);
+    }
+  }
   for (const std::vector<double>& point : points) {
     EffectTrajectory& trajectory = plan_.trajectories.emplace_back();
     for (std::size_t j = 0; j < p; ++j) trajectory.base.push_back(insideCube(point[j]));
@@ -210,61 +217,57 @@ void Planner::planRadial() {
   }
 }
 
-Planner::Candidate Planner::drawCandidate() {
+std::vector<Planner::Chain> Planner::drawChains() {
   const std::size_t p = size();
-  Candidate candidate;
-  for (std::size_t j = 0; j < p; ++j) {
-    candidate.level.push_back(static_cast<std::uint8_t>(random_.next() * settings_.levels));
+  const auto r = static_cast<std::size_t>(settings_.trajectories);
+  std::vector<Chain> chains(r);
+  const UnitPoints starts = latinHypercube(r, p, random_);
+  for (std::size_t t = 0; t < r; ++t) {
+    Chain& chain = chains[t];
+    for (const double u : starts[t]) chain.level.push_back(static_cast<std::uint8_t>(u * settings_.levels));
+    chain.order.resize(p);
+    std::iota(chain.order.begin(), chain.order.end(), std::uint32_t{0});
+    for (std::size_t left = p; left > 1; --left) {
+      const auto pick = static_cast<std::size_t>(random_.next() * static_cast<double>(left));
+      std::swap(chain.order[left - 1], chain.order[pick]);
+    }
+    // The parameter that steps k-th, from 0, has its first value in k + 1 of the p + 1 points.
+    chain.centroid.resize(p);
+    for (std::size_t k = 0; k < p; ++k) {
+      const std::uint32_t j = chain.order[k];
+      const double share = static_cast<double>(k + 1) / static_cast<double>(p + 1);
+      const int level = chain.level[j];
+      chain.centroid[j] = static_cast<float>(share * ofLevel(level) + (1.0 - share) * ofLevel(stepped(level)));
+    }
   }
-  candidate.order.resize(p);
-  std::iota(candidate.order.begin(), candidate.order.end(), std::uint32_t{0});
-  for (std::size_t left = p; left > 1; --left) {
-    std::swap(candidate.order[left - 1],
-              candidate.order[static_cast<std::size_t>(random_.next() * static_cast<double>(left))]);
-  }
-  // The parameter that steps k-th, from 0, has its first value in k + 1 of the p + 1 points.
-  candidate.centroid.resize(p);
-  for (std::size_t k = 0; k < p; ++k) {
-    const std::uint32_t j = candidate.order[k];
-    const double share = static_cast<double>(k + 1) / static_cast<double>(p + 1);
-    const int level = candidate.level[j];
-    candidate.centroid[j] = static_cast<float>(share * ofLevel(level) + (1.0 - share) * ofLevel(stepped(level)));
-  }
-  return candidate;
+  return chains;
 }
 
-std::vector<std::size_t> Planner::mostDifferent(std::span<const Candidate> candidates) const {
-  const auto r = static_cast<std::size_t>(settings_.trajectories);
-  std::vector<std::size_t> taken(r);
-  std::iota(taken.begin(), taken.end(), std::size_t{0});
-  if (candidates.size() <= r) return taken;
-  taken.resize(1);
-  std::vector<double> nearest(candidates.size(), std::numeric_limits<double>::infinity());
-  while (taken.size() < r) {
-    const std::vector<float>& last = candidates[taken.back()].centroid;
-    nearest[taken.back()] = -1.0;
-    for (std::size_t i = 0; i < candidates.size(); ++i) {
-      if (nearest[i] < 0.0) continue;
+/// The squared distance of the two nearest centroids, or any value not above `enough` once it is known to be that
+/// small.
+double Planner::spreadOf(std::span<const Chain> chains, double enough) {
+  double least = std::numeric_limits<double>::infinity();
+  for (std::size_t a = 0; a < chains.size() && least > enough; ++a) {
+    for (std::size_t b = 0; b < a; ++b) {
       double squared = 0.0;
-      for (std::size_t j = 0; j < last.size(); ++j) {
-        const double difference = candidates[i].centroid[j] - last[j];
+      for (std::size_t j = 0; j < chains[a].centroid.size(); ++j) {
+        const double difference = chains[a].centroid[j] - chains[b].centroid[j];
         squared += difference * difference;
       }
-      nearest[i] = std::min(nearest[i], squared);
+      least = std::min(least, squared);
     }
-    taken.push_back(static_cast<std::size_t>(std::ranges::max_element(nearest) - nearest.begin()));
   }
-  return taken;
+  return least;
 }
 
-void Planner::follow(const Candidate& candidate) {
+void Planner::follow(const Chain& chain) {
   const std::size_t p = size();
   EffectTrajectory& trajectory = plan_.trajectories.emplace_back();
-  for (const std::uint8_t level : candidate.level) {
+  for (const std::uint8_t level : chain.level) {
     trajectory.base.push_back(ofLevel(level));
     trajectory.moved.push_back(ofLevel(stepped(level)));
   }
-  trajectory.order.assign(candidate.order.begin(), candidate.order.end());
+  trajectory.order.assign(chain.order.begin(), chain.order.end());
   trajectory.width.assign(p, 0.0);
   trajectory.evaluations.assign(p + 1, 0);
   std::vector<double> point = trajectory.base;
@@ -287,10 +290,16 @@ void Planner::follow(const Candidate& candidate) {
 }
 
 void Planner::planChains() {
-  std::vector<Candidate> candidates;
-  const int count = std::max(settings_.trajectories, settings_.candidates);
-  for (int i = 0; i < count; ++i) candidates.push_back(drawCandidate());
-  for (const std::size_t i : mostDifferent(candidates)) follow(candidates[i]);
+  std::vector<Chain> best = drawChains();
+  double spread = settings_.candidates > 1 ? spreadOf(best, 0.0) : 0.0;
+  for (int i = 1; i < settings_.candidates; ++i) {
+    std::vector<Chain> chains = drawChains();
+    const double another = spreadOf(chains, spread);
+    if (!(another > spread)) continue;
+    spread = another;
+    best = std::move(chains);
+  }
+  for (const Chain& chain : best) follow(chain);
 }
 
 }  // namespace

@@ -52,16 +52,18 @@ struct EffectPlan {
 /// Plans the trajectories. Equal arguments give equal plans; the stream of random numbers starts afresh from the seed.
 ///
 /// Radial: base point and steps from a scrambled Sobol' sequence of 2 p coordinates (Campolongo, Saltelli and Cariboni
-/// 2011, doi:10.1016/j.cpc.2010.12.039). Unlike there, a step is at least a tenth of the distribution, so that what
-/// rounding does to the outputs is not magnified; of more than 1833 parameters, for which there are no Sobol' numbers,
-/// the points are a Latin hypercube sample. The step of an integer parameter changes its value, and no point is one
-/// that cannot be run, as far as some tries find others.
+/// 2011, doi:10.1016/j.cpc.2010.12.039). Unlike there, each step is combined with a base point at random, as few Sobol'
+/// points may lie badly in two dimensions and effects then vary more than those of random points; and a step is at
+/// least a tenth of the distribution, so that what rounding does to the outputs is not magnified. Of more than 1833
+/// parameters, for which there are no Sobol' numbers, the points are a Latin hypercube sample. The step of an integer
+/// parameter changes its value, and no point is one that cannot be run, as far as some tries find others.
 ///
 /// Trajectories: the levels are the middles of `levels` equal strata, as an unbounded distribution has no value at the
-/// ends, where Morris has them; a step goes over half of them. Of the candidates, those are taken that differ most, in
-/// the spirit of Campolongo, Cariboni and Saltelli (2007, doi:10.1016/j.envsoft.2006.10.004), whose search over all
-/// combinations is replaced: one by one, that whose mean squared distance to the nearest one taken is largest. That
-/// between the points of two trajectories is, but for a constant, the squared distance of their centroids.
+/// ends, where Morris has them; a step goes over half of them. Each parameter begins at all levels nearly equally
+/// often. Of the candidates, designs of r random trajectories, the one is taken whose two most similar trajectories
+/// differ most: the mean squared distance between the points of two of them is, but for a constant, the squared
+/// distance of their centroids. Campolongo, Cariboni and Saltelli (2007, doi:10.1016/j.envsoft.2006.10.004) choose r of
+/// many trajectories; that prefers those at the border, and mu* is then not that of the distribution.
 EffectPlan planEffects(const MorrisSettings& settings, const SearchSpace& space,
                        const ParameterDistributions& distributions, std::int32_t seed,
                        const Feasibility& feasibility = {});

@@ -42,12 +42,12 @@ const SettingSection<MorrisSettings>& morrisSection() {
                                     fmt::format("expected an even number, found {}", s.levels)};
             }),
         setting<&Settings::candidates>(
-            {.name = "Candidate_Trajectories",
-             .defaultValue = "500",
+            {.name = "Candidate_Designs",
+             .defaultValue = "50",
              .range = between(1, 100000),
-             .refusal = "Error: Number of candidate trajectories in Morris analysis invalid",
-             .meaning = "Of `Design = 'trajectories'`: random trajectories of which those that differ most are taken. "
-                        "If these are not more than `Trajectories`, all trajectories are random."}),
+             .refusal = "Error: Number of candidate designs in Morris analysis invalid",
+             .meaning = "Of `Design = 'trajectories'`: random designs of which the one is taken whose trajectories "
+                        "differ most."}),
         setting<&Settings::bootstrapSamples>(
             {.name = "Bootstrap_Samples",
              .defaultValue = "1000",

@@ -18,7 +18,8 @@ struct MorrisSettings {
   EffectDesign design = EffectDesign::radial;
   std::int32_t trajectories = 30;  ///< r
   std::int32_t levels = 4;         ///< of each parameter in trajectories, even
-  std::int32_t candidates = 500;   ///< random trajectories of which the r most different are taken
+  std::int32_t candidates =
+      50;  ///< random designs on levels, of which that with the most different trajectories is taken
   std::int32_t bootstrapSamples = 1000;
   double negligibleShare = 0.1;  ///< of the largest mu*, below which a parameter is negligible
 };

@@ -181,12 +181,8 @@ std::vector<std::string> formatMorris(const MorrisOutcome& outcome, const Effect
                                       const MorrisSettings& settings, const AnalysisNames& names,
                                       std::string_view file) {
   Texts texts{settings, names, {}};
-  const std::string how = plan.design == EffectDesign::radial
-                              ? "radial, from Sobol' points"
-                              : fmt::format("on {} levels, {}", settings.levels,
-                                            settings.candidates > settings.trajectories
-                                                ? fmt::format("the most different of {}", settings.candidates)
-                                                : "random");
+  const std::string how =
+      plan.design == EffectDesign::radial ? "radial, from Sobol' points" : fmt::format("on {} levels", settings.levels);
   texts.lines.push_back(fmt::format("Morris screening: {} trajectories ({}) of {} parameters, {} evaluations",
                                     plan.trajectories.size(), how, names.parameters.size(), plan.evaluationCount));
   texts.lines.emplace_back(

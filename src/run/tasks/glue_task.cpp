@@ -18,6 +18,7 @@
 #include "run/tasks/distribution_reading.h"
 #include "run/tasks/infeasible_sets.h"
 #include "run/tasks/sample_bands.h"
+#include "run/tasks/simulated_room.h"
 
 namespace mirevo {
 namespace {
@@ -186,7 +187,7 @@ EarlierSample GlueTask::evaluateSample(const TaskContext& context) const {
   }
   context.log.line(setsOutsideBounds(drawn.sets, context.space));
   logBandTimes(context, settings);
-  logRoom(context, settings.sampleSize);
+  logRoomOfSimulatedValues(context, run_files::kPlain.simulatedValues, drawn.sets.size());
   const std::vector<EvaluationResult> results = context.evaluator.evaluateParameterSets(drawn.sets, DispatchMode::task);
   EarlierSample evaluated{.simulatedColumns = context.simulatedColumns};
   for (std::size_t i = 0; i < results.size(); ++i) {

@@ -137,7 +137,7 @@ void logBestSet(const TaskContext& context, const ParameterSet& best, const Eval
   context.log.line(fmt::format("Aggregate: {}", formatReal(result.aggregate)));
 }
 
-/// "Algorithm_Type = 'PSE', 'PDDS' or 'OPSE', or ..."
+/// "Algorithm_Type = 'PSE', 'PDDS', 'OPSE' or 'CMA-ES', or ..."
 std::string waysToRunSeveral() {
   std::string text = fmt::format("{} = {}", kAlgorithmKeyword, searchesWith(&SearchFacts::runsInParallel, "or", "'"));
   for (const auto& search : searchMethods().all()) {
@@ -330,6 +330,7 @@ void OptimisationTask::readMethod(const TaskReading& reading, const SetupSection
   const BoundSection bound = method->section();
   const SetupSection control = section.open(nameInside(*bound.row));
   control.read(bound);
+  method->setVariableCount(reading.variableCount);
   // A population or simplex that is too small spans too few directions and converges early, away from the optimum.
   for (const SearchAdvice& advice : method->advice(reading.variableCount)) {
     if (advice.found >= advice.advised) continue;
@@ -488,6 +489,7 @@ TaskOutcome OptimisationTask::run(const TaskContext& context) {
 
   const SearchSummary summary = search(context);
   context.log.line("");
+  for (const std::string& note : summary.notes) context.log.line(note);
   context.log.line(summary.terminationMessage);
   if (summary.replacedCount > 0) {
     context.log.line(fmt::format(

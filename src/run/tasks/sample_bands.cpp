@@ -3,8 +3,6 @@
 #include <algorithm>
 #include <cmath>
 #include <cstdint>
-#include <filesystem>
-#include <system_error>
 
 #include <fmt/format.h>
 
@@ -35,10 +33,6 @@ std::string coverageText(const std::string& name, const BandCoverage& coverage) 
   if (coverage.observationCount == 0) return fmt::format("Band of {}: no observation has a simulated value", name);
   return fmt::format("Band of {}: {:.1f} % of {} observations lie between the 5 and the 95 % quantile", name,
                      100.0 * coverage.shareInside, coverage.observationCount);
-}
-
-std::string sizeText(std::uintmax_t bytes) {
-  return fmt::format("{:.1f} MB", static_cast<double>(bytes) / 1e6);
 }
 
 }  // namespace
@@ -86,30 +80,6 @@ void logBandTimes(const TaskContext& context, const UncertaintySettings& setting
     context.log.warning(fmt::format(
         "Band of {}: {} in the model's folder has no step at {} = {} or shortly before it, and the band ends earlier",
         name, trimTrailing(measure.simulation.fileName), kBandEndKeyword, formatDate(*settings.bandEnd)));
-  }
-}
-
-void logRoom(const TaskContext& context, int sampleSize) {
-  constexpr std::uintmax_t kMuch = 100'000'000;
-  const std::string path = runFilePath(context.filePrefix, run_files::kPlain.simulatedValues);
-  const std::uintmax_t bytes = static_cast<std::uintmax_t>(sampleSize) * sizeof(double) *
-                               simulatedValueCount(context.observedSeries, SeriesPrecision::single);
-  std::error_code failed;
-  const std::uintmax_t size = std::filesystem::file_size(path, failed);
-  const std::uintmax_t written = failed ? 0 : std::min(size, bytes);
-  const std::filesystem::space_info disk = std::filesystem::space(std::filesystem::path(path).parent_path(), failed);
-  const bool isShort = !failed && bytes - written > disk.available;
-  if (bytes < kMuch && !isShort) return;
-  std::string text =
-      fmt::format("The simulated values of {} sets take {} in {}", sampleSize, sizeText(bytes), fileNameOf(path));
-  if (written > 1'000'000) text += fmt::format(", which has {} of them", sizeText(written));
-  if (!failed) text += fmt::format("; its disk has {}{} free", isShort ? "only " : "", sizeText(disk.available));
-  if (isShort && context.warnUser) {
-    context.warnUser(text);
-  } else if (isShort) {
-    context.log.warning(text);
-  } else {
-    context.log.line(text);
   }
 }
 

@@ -23,9 +23,6 @@ std::optional<KeptSteps> bandSteps(const UncertaintySettings& settings);
 /// time.
 void logBandTimes(const TaskContext& context, const UncertaintySettings& settings);
 
-/// Where the simulated values take much room, or more than there is.
-void logRoom(const TaskContext& context, int sampleSize);
-
 /// Adds the band of each series over the evaluations `numbers` to `files` and returns lines on each for the report.
 /// `weights`: one per evaluation; empty: they weigh the same.
 std::vector<std::string> reportBands(const TaskContext& context, const UncertaintySettings& settings,

@@ -30,6 +30,7 @@
 namespace mirevo {
 
 struct SensitivitySettings;
+struct SobolSettings;
 
 /// A form of a task and the keyword that selects it.
 struct TaskForm {
@@ -121,6 +122,7 @@ struct TaskReport {
   bool isGlue = false;                               ///< it writes the weights of GLUE
   const SensitivitySettings* sensitivity = nullptr;  ///< for a local sensitivity analysis, else null
   bool hasMorris = false;                            ///< it writes the table of a Morris screening
+  const SobolSettings* sobol = nullptr;              ///< for Sobol' indices, else null
   std::vector<std::string> runNames = {};  ///< of the evaluations, from the first on; empty where one has none
 };
 

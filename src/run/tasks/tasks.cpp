@@ -5,6 +5,7 @@
 #include "run/tasks/optimisation_task.h"
 #include "run/tasks/scenario_task.h"
 #include "run/tasks/sensitivity_task.h"
+#include "run/tasks/sobol_task.h"
 #include "run/tasks/uncertainty_task.h"
 
 namespace mirevo {
@@ -27,7 +28,7 @@ const ChoiceTable<Task>& tasks() {
 
 std::vector<std::unique_ptr<Task>> furtherTaskForms() {
   /// A new form of a task is added here, and its name to the codes of the keyword that selects it.
-  return oneOfEach<MorrisTask, GlueTask>();
+  return oneOfEach<MorrisTask, SobolTask, GlueTask>();
 }
 
 std::unique_ptr<Task> selectedForm(const Task& task, const SetupSection& target) {

@@ -7,6 +7,7 @@
 #include "run/tasks/distribution_reading.h"
 #include "run/tasks/infeasible_sets.h"
 #include "run/tasks/sample_bands.h"
+#include "run/tasks/simulated_room.h"
 
 namespace mirevo {
 
@@ -130,7 +131,7 @@ TaskOutcome UncertaintyTask::run(const TaskContext& context) {
   std::vector<ParameterSet> sample = drawSample(context, acceptance);
   context.log.line(setsOutsideBounds(sample, context.space));
   logBandTimes(context, settings);
-  logRoom(context, settings.sampleSize);
+  logRoomOfSimulatedValues(context, run_files::kPlain.simulatedValues, sample.size());
   const UncertaintyOutcome found = uncertaintyAnalysis(std::move(sample), context.evaluator);
   TaskOutcome outcome = outcomeOf(context, found);
   if (!acceptance.empty()) outcome.report.insert(outcome.report.begin() + 1, acceptance);

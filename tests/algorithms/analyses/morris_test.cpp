@@ -94,13 +94,16 @@ TEST(ElementaryEffects, OnLevelsHitAllOfThemAndTheTrajectoriesTakenAreMostDiffer
                     space, distributions, 1);
     std::vector<std::vector<double>> centroids;
     std::set<double> values;
+    std::map<double, int> starts;
     for (const EffectTrajectory& trajectory : plan.trajectories) {
+      for (const double u : trajectory.base) ++starts[u];
       std::vector<double>& centroid = centroids.emplace_back(3);
       for (const ParameterSet& set : setsOf(plan, trajectory, distributions)) {
         for (std::size_t k = 0; k < 3; ++k) centroid[k] += set[k] / 4.0;
         values.insert(set.begin(), set.end());
       }
     }
+    for (const auto& [value, count] : starts) EXPECT_EQ(count, 3 * 12 / 6) << value;
     EXPECT_EQ(values.size(), 6U);
     EXPECT_NEAR(*values.begin(), 1.0 / 12.0, 1e-12);
     double least = 9.0;
@@ -113,7 +116,7 @@ TEST(ElementaryEffects, OnLevelsHitAllOfThemAndTheTrajectoriesTakenAreMostDiffer
     }
     return least;
   };
-  EXPECT_GT(nearest(500), 10.0 * nearest(12));
+  EXPECT_GT(nearest(500), 2.0 * nearest(1));
 }
 
 TEST(ElementaryEffects, OfALinearModelAreItsCoefficientsTimesTheRanges) {
@@ -177,12 +180,12 @@ TEST(ElementaryEffects, AFailedRunCostsTheEffectsThatItIsPartOfAndNoMore) {
 
 TEST(ElementaryEffects, SetsThatCannotBeRunAreNotHandedOver) {
   const SearchSpace space = spaceOf(3);
-  const Feasibility feasibility = feasibleWhere([](const auto& set) { return set[0] + set[1] < 1.0; }, "a + b < 1");
+  const Feasibility feasibility = feasibleWhere([](const auto& set) { return set[0] + set[1] < 1.4; }, "a + b < 1.4");
   for (const EffectDesign design : kDesigns) {
     const auto found = screen(
         {.design = design, .trajectories = 20}, space,
         [](int, const auto& x) {
-          EXPECT_LT(x[0] + x[1], 1.0);
+          EXPECT_LT(x[0] + x[1], 1.4);
           return resultOf(x[0] + 2.0 * x[1] + x[2]);
         },
         feasibility);

@@ -11,6 +11,7 @@ int main(int argc, char** argv) {
       {"uncertainty", {.option = 3, .maxEvaluations = 60, .modelArguments = "--fail-above 6"}},
       {"glue", {.option = 3, .maxEvaluations = 120, .modelArguments = "--fail-above 9.5"}},
       {"sensitivity", {.option = 1}},
+      {"sobol", {.option = 1}},
       {"scenarios", {.option = 0, .scenarios = scenarios(30)}},
       {"allFailed", {.option = 0, .scenarios = scenarios(30), .modelArguments = "--fail-above -1"}}};
   if (argc != 2) return 2;
@@ -23,6 +24,10 @@ int main(int argc, char** argv) {
       const std::string text = folder.read("basin.kdx");
       folder.write("basin.kdx", text.substr(0, text.find("    [PARAMETER_1]\n      Mean_Value")) +
                                     text.substr(text.find("  [/UNCERTAINTY_ESTIMATION]")));
+    }
+    if (name == "sobol") {
+      folder.editSetup("Sensitivity_Type = 0",
+                       "Sensitivity_Type = 'Sobol'\n[SOBOL]\nSample_Size = 64\nSecond_Order = 1\n[/SOBOL]");
     }
     runProgram({setup});
     std::filesystem::copy_file(folder / "basin_Report.html", std::string(argv[1]) + "/" + name);
