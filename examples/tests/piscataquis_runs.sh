@@ -46,3 +46,9 @@ test "$(wc -l <"$folder/uncertainty_Band_1.csv")" -eq 3289
 # A band over the years of calibration and the ten that follow.
 test "$(wc -l <"$folder/glue_Band_1.csv")" -eq 7034
 grep -q '^# Band of NSE in 1991 to 2000 (validation): [1-9][0-9.]* % of 3653 observations lie ' "$folder/glue.dat"
+
+# A few blocks of the Sobol' analysis: 256 model runs.
+sed 's/Sample_Size    = .*/Sample_Size    = 32/' "$3/sobol.kdx" >"$folder/sobol.kdx"
+VOLK_PROGRESS=NONE "$1" "$folder/sobol.kdx" || { cat "$folder/sobol.log"; exit 1; }
+test "$(grep -c '^objective	Discharge	.*	total	' "$folder/sobol_Sobol.dat")" -eq 6
+test "$(wc -l <"$folder/sobol_SobolSeries_1.csv")" -eq 3289

@@ -14,12 +14,12 @@ namespace mirevo {
 /// What GLUE has found of one parameter.
 struct ReportedGlueParameter {
   std::string name;
-  bool isLogarithmic = false;         ///< its bins are of equal width in logarithms
-  std::vector<double> values;         ///< of the sets of ReportedGlue::numbers
-  std::vector<double> edges;          ///< of the bins, ascending; one more than there are bins
-  std::vector<double> drawnShare;     ///< of the successful sets, one per bin
+  bool isLogarithmic = false;       ///< its bins are of equal width in logarithms
+  std::vector<double> values;       ///< of the sets of ReportedGlue::numbers
+  std::vector<double> edges;        ///< of the bins, ascending; one more than there are bins
+  std::vector<double> drawnShare;   ///< of the successful sets, one per bin
   std::vector<double> weightShare;  ///< of the weight of the behavioural sets
-  double distance = 0.0;              ///< of the two distributions, as in the log; NaN without a behavioural set
+  double distance = 0.0;            ///< of the two distributions, as in the log; NaN without a behavioural set
 };
 
 /// The weights of GLUE. Dots of more than a few thousand behavioural sets are thinned; shares are of all.

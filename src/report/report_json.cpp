@@ -11,6 +11,7 @@
 #include "report/drawn_lines.h"
 #include "report/hydrograph_views.h"
 #include "report/json_writer.h"
+#include "report/report_sample.h"
 #include "report/report_validation.h"
 #include "report/thinning.h"
 
@@ -376,9 +377,10 @@ std::string reportJson(const ReportData& data) {
   writeValidation(json, data);
   writeBands(json, data);
   if (data.sensitivity) writeSensitivity(json, *data.sensitivity);
-  if (data.glue) writeGlue(json, *data.glue);
   if (!data.morris.empty()) writeMorris(json, data.morris);
   if (data.sobol) writeSobol(json, *data.sobol);
+  if (data.glue) writeGlue(json, *data.glue);
+  writeSample(json, data);
   json.member("summary", data.summary).endObject();
   return json.take();
 }

@@ -272,7 +272,7 @@ export interface SobolOutput {
   total: SobolIndex[];
   interactions: SobolIndex[];
   sumOfFirst: SobolIndex[]; // one
-  second: Maybe[][]; // of each two factors, above the diagonal; empty where it was not asked for
+  second: Maybe[][]; // of each two factors; empty where it was not asked for
   rows: number[]; // sizes of the sample
   stages: { total: SobolIndex[] }[]; // one per size
 }
@@ -297,6 +297,23 @@ export interface Sobol {
   series: SobolSeries[];
 }
 
+/** From which the values of a variable parameter were drawn. */
+export interface Distribution {
+  text: string;
+  quantiles: Maybe[]; // at equal steps of the probability from half a step on
+}
+
+export interface SampleSensitivity {
+  parameters: string[];
+  outputs: string[];
+  kinds: string[]; // of the outputs, 'measure' or 'objective'
+  rankCorrelations: Maybe[][]; // one row per parameter, one column per output
+  firstOrder: Maybe[][];
+  lower: Maybe[][]; // 95 % limits
+  upper: Maybe[][];
+  areCorrelated: boolean; // the parameters
+}
+
 export interface ReportData {
   format: number;
   program: string;
@@ -314,9 +331,11 @@ export interface ReportData {
   validation?: Validation | null;
   band: Band[];
   sensitivity: Sensitivity | null;
-  glue?: Glue | null;
   morris: Screening[];
   sobol?: Sobol | null;
+  glue?: Glue | null;
+  distributions?: Distribution[]; // one per variable parameter, or none
+  sampleSensitivity?: SampleSensitivity | null;
   summary: string[];
 }
 

@@ -10,6 +10,7 @@ import { historySection } from './sections/histories';
 import { morrisSection } from './sections/morris';
 import { failureSection, head, parameterSection, resultSection, runSection, summarySection } from './sections/overview';
 import { dottySection, goodSetsSection, progressSection } from './sections/search';
+import { sampleSection } from './sections/sample';
 import type { Section } from './sections/section';
 import { sensitivitySection } from './sections/sensitivity';
 import { seriesSection } from './sections/series';
@@ -26,6 +27,7 @@ function sections(data: ReportData): Section[] {
     sensitivitySection(data),
     morrisSection(data),
     sobolSection(data),
+    sampleSection(data),
     validationSection(data),
     seriesSection(data),
     parameterSection(data),

@@ -187,7 +187,7 @@ EarlierSample GlueTask::evaluateSample(const TaskContext& context) const {
   }
   context.log.line(setsOutsideBounds(drawn.sets, context.space));
   logBandTimes(context, settings);
-  logRoomOfSimulatedValues(context, run_files::kPlain.simulatedValues, drawn.sets.size());
+  logRoomOfSimulatedValues(context, run_files::kPlain.simulatedValues, static_cast<std::size_t>(settings.sampleSize));
   const std::vector<EvaluationResult> results = context.evaluator.evaluateParameterSets(drawn.sets, DispatchMode::task);
   EarlierSample evaluated{.simulatedColumns = context.simulatedColumns};
   for (std::size_t i = 0; i < results.size(); ++i) {

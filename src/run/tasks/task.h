@@ -29,6 +29,7 @@
 
 namespace mirevo {
 
+class ParameterDistributions;
 struct SensitivitySettings;
 struct SobolSettings;
 
@@ -115,14 +116,15 @@ struct TaskOutcome {
 
 /// What a report shows of a task besides its evaluations.
 struct TaskReport {
-  std::string algorithm = {};                        ///< the name of the search: "DDS"; empty: none
-  std::string surrogate = {};                        ///< the surrogate model that assists it; empty: none
-  int populationSize = 0;                            ///< 0: none
-  bool hasBands = false;                             ///< it writes bands of simulated series
-  bool isGlue = false;                               ///< it writes the weights of GLUE
-  const SensitivitySettings* sensitivity = nullptr;  ///< for a local sensitivity analysis, else null
-  bool hasMorris = false;                            ///< it writes the table of a Morris screening
-  const SobolSettings* sobol = nullptr;              ///< for Sobol' indices, else null
+  std::string algorithm = {};                             ///< the name of the search: "DDS"; empty: none
+  std::string surrogate = {};                             ///< the surrogate model that assists it; empty: none
+  int populationSize = 0;                                 ///< 0: none
+  bool hasBands = false;                                  ///< it writes bands of simulated series
+  bool isGlue = false;                                    ///< it writes the weights of GLUE
+  const SensitivitySettings* sensitivity = nullptr;       ///< for a local sensitivity analysis, else null
+  bool hasMorris = false;                                 ///< it writes the table of a Morris screening
+  const SobolSettings* sobol = nullptr;                   ///< for Sobol' indices, else null
+  const ParameterDistributions* distributions = nullptr;  ///< from which the sets were drawn; null: none
   std::vector<std::string> runNames = {};  ///< of the evaluations, from the first on; empty where one has none
 };
 

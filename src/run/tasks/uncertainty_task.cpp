@@ -2,6 +2,7 @@
 
 #include <fmt/format.h>
 
+#include "algorithms/analyses/sample_sensitivity.h"
 #include "algorithms/analyses/sampled_distributions.h"
 #include "run/tasks/analysis_names.h"
 #include "run/tasks/distribution_reading.h"
@@ -115,6 +116,12 @@ TaskOutcome UncertaintyTask::outcomeOf(const TaskContext& context, const Uncerta
       formatUncertainty(summary, names, fileNameOf(runFilePath(context.filePrefix, run_files::kSampleCorrelation)));
   outcome.report.insert(outcome.report.begin() + 1, setsOutsideBounds(found.sample, context.space));
   outcome.tables = uncertaintyTables(summary, names);
+  const bool areCorrelated = settings.distributions.copula().has_value();
+  const SampleSensitivity sensitivity = sampleSensitivity(found, context.space, names, randomSeed);
+  outcome.tables.push_back(sampleSensitivityTable(sensitivity, names, areCorrelated));
+  const std::vector<std::string> dependences = formatSampleSensitivity(
+      sensitivity, names, fileNameOf(runFilePath(context.filePrefix, run_files::kSampleSensitivities)), areCorrelated);
+  outcome.report.insert(outcome.report.end(), dependences.begin(), dependences.end());
   std::vector<int> numbers;
   for (const EvaluationResult& result : found.results) {
     if (result.ok()) numbers.push_back(result.number);
@@ -131,7 +138,7 @@ TaskOutcome UncertaintyTask::run(const TaskContext& context) {
   std::vector<ParameterSet> sample = drawSample(context, acceptance);
   context.log.line(setsOutsideBounds(sample, context.space));
   logBandTimes(context, settings);
-  logRoomOfSimulatedValues(context, run_files::kPlain.simulatedValues, sample.size());
+  logRoomOfSimulatedValues(context, run_files::kPlain.simulatedValues, static_cast<std::size_t>(settings.sampleSize));
   const UncertaintyOutcome found = uncertaintyAnalysis(std::move(sample), context.evaluator);
   TaskOutcome outcome = outcomeOf(context, found);
   if (!acceptance.empty()) outcome.report.insert(outcome.report.begin() + 1, acceptance);

@@ -24,7 +24,7 @@ class UncertaintyTask final : public Task {
   void requireSets(const SearchSpace& space, const Feasibility& feasibility) const override;
   TaskOutcome run(const TaskContext& context) override;
   std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const override;
-  TaskReport report() const override { return {.hasBands = true}; }
+  TaskReport report() const override { return {.hasBands = true, .distributions = &settings.distributions}; }
 
   UncertaintySettings settings;
 
