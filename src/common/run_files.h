@@ -70,7 +70,9 @@ inline constexpr RunFile kSensitivities{"_Sensitivities", ".dat", false, true};
 inline constexpr RunFile kMorris{"_Morris", ".dat", false, true};
 inline constexpr RunFile kQuantiles{"_Quantiles", ".dat", false, true};
 inline constexpr RunFile kSampleCorrelation{"_SampleCorrelation", ".dat", false, true};
-inline constexpr std::array kUncertaintyTables{kQuantiles, kSampleCorrelation};
+inline constexpr RunFile kSampleSensitivities{"_SampleSensitivities", ".dat", false, true};
+inline constexpr RunFile kGlue{"_Glue", ".dat", false, true};
+inline constexpr std::array kUncertaintyTables{kQuantiles, kSampleCorrelation, kSampleSensitivities, kGlue};
 inline constexpr RunFile kSobol{"_Sobol", ".dat", false, true};
 inline constexpr RunFile kSobolConvergence{"_SobolConvergence", ".dat", false, true};
 inline constexpr std::array kSensitivityTables{kCovariance,    kCorrelation, kParameterLimits, kJacobian,
