@@ -47,6 +47,8 @@ inline constexpr RunFile kScenarioSeries{"_ScenarioSeries", ".dat"};
 inline constexpr RunFile kReport{
     .stem = "_Report", .extension = ".html", .mark = "content=\"default-src 'none'; script-src"};
 inline constexpr RunFile kBand{.stem = "_Band_", .extension = ".csv", .isNumbered = true, .mark = "# Band of "};
+inline constexpr RunFile kSobolSeries{
+    .stem = "_SobolSeries_", .extension = ".csv", .isNumbered = true, .mark = "# Sobol' indices of "};
 inline constexpr RunFile kSavedFolder{"_Saved", ""};
 /// These two stand beside the setup, or in the folder that it names for them.
 inline constexpr RunFile kFailedFolder{"_Failed", "", true};
@@ -65,11 +67,15 @@ inline constexpr RunFile kCorrelation{"_Correlation", ".dat", false, true};
 inline constexpr RunFile kParameterLimits{"_ParameterLimits", ".dat", false, true};
 inline constexpr RunFile kJacobian{"_Jacobian", ".dat", false, true};
 inline constexpr RunFile kSensitivities{"_Sensitivities", ".dat", false, true};
+inline constexpr RunFile kMorris{"_Morris", ".dat", false, true};
 inline constexpr RunFile kQuantiles{"_Quantiles", ".dat", false, true};
 inline constexpr RunFile kSampleCorrelation{"_SampleCorrelation", ".dat", false, true};
 inline constexpr RunFile kSampleSensitivities{"_SampleSensitivities", ".dat", false, true};
 inline constexpr std::array kUncertaintyTables{kQuantiles, kSampleCorrelation, kSampleSensitivities};
-inline constexpr std::array kSensitivityTables{kCovariance, kCorrelation, kParameterLimits, kJacobian, kSensitivities};
+inline constexpr RunFile kSobol{"_Sobol", ".dat", false, true};
+inline constexpr RunFile kSobolConvergence{"_SobolConvergence", ".dat", false, true};
+inline constexpr std::array kSensitivityTables{kCovariance,    kCorrelation, kParameterLimits, kJacobian,
+                                               kSensitivities, kMorris,      kSobol,           kSobolConvergence};
 
 /// What all tasks call alike behind their own stem.
 constexpr RunFile restartFile(std::string_view stem) {

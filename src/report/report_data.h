@@ -9,6 +9,8 @@
 
 #include "evaluation/evaluation_result.h"
 #include "report/failure_reasons.h"
+#include "report/report_morris.h"
+#include "report/report_sobol.h"
 #include "report/series_above.h"
 #include "report/series_labels.h"
 #include "run/results/run_record.h"
@@ -199,6 +201,8 @@ struct ReportData {
   std::optional<ReportedSensitivity> sensitivity;
   std::vector<ReportedDistribution> distributions;  ///< one per variable parameter, or none at all
   std::optional<ReportedSampleSensitivity> sampleSensitivity;
+  std::vector<ReportedScreening> morris;
+  std::optional<ReportedSobol> sobol;
   std::vector<std::string> summary;  ///< the closing lines of the result file
 };
 

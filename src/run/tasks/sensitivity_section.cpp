@@ -12,7 +12,8 @@ const SettingSection<Task>& sensitivitySection() {
                       .range = between(0, 0),
                       .codes = kSensitivityTypeNames,
                       .refusal = "Error: Invalid sensitivity type selection",
-                      .meaning = "0 local sensitivity analysis."}),
+                      .meaning = "0 local sensitivity analysis; `'Morris'` screening by elementary effects; `'Sobol'` "
+                                 "Sobol' indices."}),
         setting<&Task::randomSeed>(
             {.name = "Random_Seed",
              .defaultValue = "1",

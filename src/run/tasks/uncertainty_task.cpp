@@ -3,8 +3,6 @@
 #include <algorithm>
 #include <cmath>
 #include <cstdint>
-#include <filesystem>
-#include <system_error>
 
 #include <fmt/format.h>
 
@@ -19,6 +17,7 @@
 #include "run/tasks/analysis_names.h"
 #include "run/tasks/distribution_reading.h"
 #include "run/tasks/infeasible_sets.h"
+#include "run/tasks/simulated_room.h"
 
 namespace mirevo {
 namespace {
@@ -55,10 +54,6 @@ std::optional<SettingRefusal> validateBandEnd(const UncertaintySettings& setting
   return SettingRefusal{kRefusal, kBandEndKeyword,
                         fmt::format("expected the end of the evaluation period, {}, or later, found {}",
                                     formatDate(period.end), formatDate(*settings.bandEnd))};
-}
-
-std::string sizeText(std::uintmax_t bytes) {
-  return fmt::format("{:.1f} MB", static_cast<double>(bytes) / 1e6);
 }
 
 /// Adds the band of each series to `files` and returns one line on each for the report.
@@ -237,37 +232,12 @@ void UncertaintyTask::logBandTimes(const TaskContext& context) const {
   }
 }
 
-/// Where the simulated values take much room, or more than there is.
-void UncertaintyTask::logRoom(const TaskContext& context) const {
-  constexpr std::uintmax_t kMuch = 100'000'000;
-  const std::string path = runFilePath(context.filePrefix, run_files::kPlain.simulatedValues);
-  const std::uintmax_t bytes = static_cast<std::uintmax_t>(settings.sampleSize) * sizeof(double) *
-                               simulatedValueCount(context.observedSeries, SeriesPrecision::single);
-  std::error_code failed;
-  const std::uintmax_t size = std::filesystem::file_size(path, failed);
-  const std::uintmax_t written = failed ? 0 : std::min(size, bytes);
-  const std::filesystem::space_info disk = std::filesystem::space(std::filesystem::path(path).parent_path(), failed);
-  const bool isShort = !failed && bytes - written > disk.available;
-  if (bytes < kMuch && !isShort) return;
-  std::string text = fmt::format("The simulated values of {} sets take {} in {}", settings.sampleSize, sizeText(bytes),
-                                 fileNameOf(path));
-  if (written > 1'000'000) text += fmt::format(", which has {} of them", sizeText(written));
-  if (!failed) text += fmt::format("; its disk has {}{} free", isShort ? "only " : "", sizeText(disk.available));
-  if (isShort && context.warnUser) {
-    context.warnUser(text);
-  } else if (isShort) {
-    context.log.warning(text);
-  } else {
-    context.log.line(text);
-  }
-}
-
 TaskOutcome UncertaintyTask::run(const TaskContext& context) {
   std::string acceptance;
   std::vector<ParameterSet> sample = drawSample(context, acceptance);
   context.log.line(setsOutsideBounds(sample, context.space));
   logBandTimes(context);
-  logRoom(context);
+  logRoomOfSimulatedValues(context, run_files::kPlain.simulatedValues, sample.size());
   const UncertaintyOutcome found = uncertaintyAnalysis(std::move(sample), context.evaluator);
   TaskOutcome outcome = outcomeOf(context, found);
   if (!acceptance.empty()) outcome.report.insert(outcome.report.begin() + 1, acceptance);

@@ -31,7 +31,6 @@ class UncertaintyTask final : public Task {
  private:
   TaskOutcome outcomeOf(const TaskContext& context, const UncertaintyOutcome& found) const;
   void logBandTimes(const TaskContext& context) const;
-  void logRoom(const TaskContext& context) const;
   std::vector<ParameterSet> drawSample(const TaskContext& context, std::string& acceptance) const;
 
   std::vector<std::vector<double>> singleValues_;  ///< of discrete distributions, by parameter

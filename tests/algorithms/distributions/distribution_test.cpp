@@ -117,7 +117,7 @@ TEST(Distribution, OfAnIntegerGivesEachValueTheWidthOfOne) {
   const DistributionPointer die = onGridOf(1, uniformDistribution(0.5, 6.5));
   std::vector<int> counts(8);
   for (int i = 0; i < 6000; ++i) ++counts[static_cast<std::size_t>(die->quantile((i + 0.5) / 6000))];
-  EXPECT_THAT(counts, testing::ElementsAre(0, 1000, 1000, 1000, 1000, 1000, 1000, 0));
+  EXPECT_THAT(counts, ::testing::ElementsAre(0, 1000, 1000, 1000, 1000, 1000, 1000, 0));
 }
 
 TEST(Distribution, OfValuesKeepsTheirProbabilities) {
@@ -128,7 +128,7 @@ TEST(Distribution, OfValuesKeepsTheirProbabilities) {
     if (isLogarithm) discrete = ofLogarithm(discrete);
     const auto at = [&](double x) { return isLogarithm ? std::log(x) : x; };
     EXPECT_FALSE(discrete->isContinuous());
-    EXPECT_THAT(discrete->singleValues(), testing::ElementsAre(1, 5));
+    EXPECT_THAT(discrete->singleValues(), ::testing::ElementsAre(1, 5));
     EXPECT_EQ(discrete->quantile(0.5), at(1));
     EXPECT_EQ(discrete->quantile(0.50001), at(5));
     EXPECT_EQ(discrete->cumulative(at(4)), 0.5);

@@ -127,7 +127,7 @@ TEST(GaussianCopula, RefusesCorrelationsThatContradictEachOther) {
     for (std::size_t j = 0; j < 3; ++j) smaller[i][j] *= i == j ? 1 : 0.5555;
   }
   EXPECT_EQ(refusalOf([&] { copulaOf(smaller); }), "accepted");
-  EXPECT_THAT(refusalOf([&] { copulaOf({{1, 1}, {1, 1}}); }), testing::HasSubstr("not positive definite"));
+  EXPECT_THAT(refusalOf([&] { copulaOf({{1, 1}, {1, 1}}); }), ::testing::HasSubstr("not positive definite"));
 }
 
 }  // namespace
