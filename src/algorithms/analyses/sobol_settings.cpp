@@ -1,6 +1,7 @@
 #include "algorithms/analyses/sobol_settings.h"
 
 #include <algorithm>
+#include <utility>
 
 #include <fmt/format.h>
 
@@ -102,8 +103,7 @@ std::vector<SobolFactor> sobolFactors(std::span<const std::string> parameters, s
     if (!groupOf[j]) {
       factors.push_back({std::string(trimTrailing(parameters[j])), {j}});
     } else if (SobolFactor& group = grouped[*groupOf[j]]; !group.parameters.empty()) {
-      factors.push_back(std::move(group));
-      group.parameters.clear();
+      factors.push_back(std::exchange(group, {}));
     }
   }
   const auto hasNameOf = [&](const SobolFactor& one) {
