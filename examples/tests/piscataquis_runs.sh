@@ -32,11 +32,13 @@ agree Aggregate "$2" 3287 1981-10-01 1990-09-30
 agree 'Discharge RMSE in 1991 to 2000' "$2" 3653 1991-01-01 2000-12-31
 
 cp "$3"/sensitivity.kdx "$3"/scenarios.kdx "$folder"
+sed 's/Trajectories = .*/Trajectories = 10/' "$3/morris.kdx" >"$folder/morris.kdx"
 sed 's/Sample_Size      = .*/Sample_Size      = 20/' "$3/uncertainty.kdx" >"$folder/uncertainty.kdx"
-for task in sensitivity scenarios uncertainty; do
+for task in sensitivity morris scenarios uncertainty; do
   VOLK_PROGRESS=NONE "$1" "$folder/$task.kdx" || { cat "$folder/$task.log"; exit 1; }
 done
 grep -q '^# *1\. X4 ' "$folder/sensitivity_Sensitivity.dat"
+grep -q '^objective	Discharge	X4	' "$folder/morris_Morris.dat"
 grep -q '^# Standard error of a residual: 11\.7' "$folder/sensitivity_Sensitivity.dat"
 awk -F '\t' '$1 == 2 { found = $9 > 11.7 && $9 < 11.8 } END { exit !found }' "$folder/scenarios.dat"
 test "$(wc -l <"$folder/uncertainty_Band_1.csv")" -eq 3289

@@ -1,7 +1,11 @@
 #include "common/data_table.h"
 
 #include <algorithm>
+#include <cmath>
 #include <limits>
+#include <utility>
+
+#include <fmt/core.h>
 
 #include "common/text.h"
 #include "common/utf8.h"
@@ -61,13 +65,40 @@ std::string unescaped(std::string_view text) {
   return result;
 }
 
-std::string cellText(const DataTable::Cell& cell) {
+/// As formatReal() does, without a text of its own for each.
+void appendReal(std::string& row, double number) {
+  constexpr std::size_t kLongest = 32;
+  if (!std::isfinite(number)) {
+    row += formatReal(number);
+    return;
+  }
+  char digits[kLongest];
+  row.append(digits, fmt::format_to_n(digits, kLongest, "{}", number).out);
+}
+
+void appendCell(std::string& row, const DataTable::Cell& cell) {
   struct Text {
-    std::string operator()(std::int64_t number) const { return std::to_string(number); }
-    std::string operator()(double number) const { return formatReal(number); }
-    std::string operator()(const std::string& text) const { return escaped(text); }
+    std::string& row;
+    void operator()(std::int64_t number) const { row += std::to_string(number); }
+    void operator()(double number) const { appendReal(row, number); }
+    void operator()(const std::string& text) const { row += escaped(text); }
   };
-  return std::visit(Text{}, cell);
+  std::visit(Text{row}, cell);
+}
+
+void appendCells(std::string& row, std::span<const DataTable::Cell> cells) {
+  for (std::size_t i = 0; i < cells.size(); ++i) {
+    if (i > 0) row += '\t';
+    appendCell(row, cells[i]);
+  }
+}
+
+void appendHeadLines(std::string& text, std::span<const std::string> lines) {
+  for (const std::string& line : lines) text += "# " + withValidUtf8(onOneLine(line)) + '\n';
+}
+
+std::string headerRow(const DataTable& table) {
+  return dataTableRow({table.columns.begin(), table.columns.end()});
 }
 
 std::vector<std::string> cellsOf(std::string_view line) {
@@ -80,23 +111,39 @@ std::vector<std::string> cellsOf(std::string_view line) {
 
 std::string dataTableRow(const std::vector<DataTable::Cell>& cells) {
   std::string row;
-  for (std::size_t i = 0; i < cells.size(); ++i) {
-    if (i > 0) row += '\t';
-    row += cellText(cells[i]);
-  }
+  appendCells(row, cells);
   return row + '\n';
 }
 
 std::string dataTableHead(const DataTable& table) {
   std::string text;
-  for (const std::string& line : table.headLines) text += "# " + withValidUtf8(onOneLine(line)) + '\n';
-  return text + dataTableRow({table.columns.begin(), table.columns.end()});
+  appendHeadLines(text, table.headLines);
+  return text + headerRow(table);
 }
 
 std::string dataTableText(const DataTable& table) {
-  std::string text = dataTableHead(table);
-  for (const auto& row : table.rows) text += dataTableRow(row);
+  std::string text;
+  DataTableParts parts(table);
+  for (std::string_view part = parts.next(); !part.empty(); part = parts.next()) text += part;
   return text;
+}
+
+std::string_view DataTableParts::next() {
+  constexpr std::size_t kPart = std::size_t{1} << 20;
+  part_.clear();
+  if (!std::exchange(hasHead_, true)) {
+    appendHeadLines(part_, firstHeadLines_);
+    part_ += dataTableHead(table_);
+  }
+  for (; row_ < table_.rows.size() && part_.size() < kPart; ++row_) {
+    appendCells(part_, table_.rows[row_]);
+    for (const std::vector<double>& column : table_.realColumns) {
+      part_ += '\t';
+      appendReal(part_, column[row_]);
+    }
+    part_ += '\n';
+  }
+  return part_;
 }
 
 std::optional<std::size_t> ReadTable::column(std::string_view name) const {

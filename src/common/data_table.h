@@ -3,6 +3,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <optional>
+#include <span>
 #include <string>
 #include <string_view>
 #include <variant>
@@ -20,7 +21,9 @@ struct DataTable {
   RunFile file;
   std::vector<std::string> headLines;  ///< for people, without "# "
   std::vector<std::string> columns;
-  std::vector<std::vector<Cell>> rows;  ///< one cell per column
+  std::vector<std::vector<Cell>> rows;  ///< one cell per column, or the first ones of each row
+  /// The columns behind those of `rows`, one value per row: of a large table 8 bytes each, where a cell takes 40.
+  std::vector<std::vector<double>> realColumns = {};
 };
 
 /// The table as text: `#` head lines, a header row, one line per row. Reals read back as the same 64 bits ("NaN",
@@ -28,6 +31,22 @@ struct DataTable {
 /// anything else that a reader of tables could misread as `\x` and two hexadecimal digits: control characters, `#`
 /// (begins a comment), `"` (opens a quoted cell), and bytes that are not UTF-8. readDataTable() restores the text.
 std::string dataTableText(const DataTable& table);
+/// dataTableText() a part at a time, so that a large text is never there as a whole.
+class DataTableParts final {
+ public:
+  /// With `firstHeadLines` above those of the table. Both must outlive the object.
+  explicit DataTableParts(const DataTable& table, std::span<const std::string> firstHeadLines = {})
+      : table_(table), firstHeadLines_(firstHeadLines) {}
+  /// The next part, which holds until the following call; empty at the end.
+  std::string_view next();
+
+ private:
+  const DataTable& table_;
+  std::span<const std::string> firstHeadLines_;
+  std::string part_;
+  std::size_t row_ = 0;
+  bool hasHead_ = false;
+};
 /// One row as in dataTableText(), line end included.
 std::string dataTableRow(const std::vector<DataTable::Cell>& cells);
 /// The `#` lines and the header row alone: the beginning of a file that grows row by row.

@@ -8,6 +8,7 @@
 #include <limits>
 #include <sys/stat.h>
 #include <unistd.h>
+#include <utility>
 
 #include <fmt/core.h>
 
@@ -27,8 +28,13 @@ std::string faultOfKind(const struct stat& status) {
   return S_ISDIR(status.st_mode) ? std::strerror(EISDIR) : "Not a regular file";
 }
 
+/// One part, the whole.
+TextParts asParts(std::string_view content) {
+  return [content]() mutable { return std::exchange(content, {}); };
+}
+
 /// Removes `path` and creates it again with `content`, and with `mode` or, if there is none, according to the umask.
-bool createAnew(const std::string& path, std::string_view content, std::optional<unsigned> mode, bool isFlushed,
+bool createAnew(const std::string& path, const TextParts& content, std::optional<unsigned> mode, bool isFlushed,
                 std::string& reason) {
   if (::unlink(path.c_str()) != 0 && errno != ENOENT) {
     reason = std::strerror(errno);
@@ -39,7 +45,10 @@ bool createAnew(const std::string& path, std::string_view content, std::optional
     reason = std::strerror(errno);
     return false;
   }
-  int error = writeWhole(file.get(), content).error;
+  int error = 0;
+  for (std::string_view part = content(); error == 0 && !part.empty(); part = content()) {
+    error = writeWhole(file.get(), part).error;
+  }
   if (error == 0 && isFlushed && ::fsync(file.get()) != 0) error = errno;
   if (error == 0 && !file.close()) error = errno;
   if (error != 0) reason = std::strerror(error);
@@ -149,10 +158,34 @@ std::optional<std::string> readFileIfThere(const std::string& path, std::size_t 
 }
 
 bool writeByUnlinkAndCreate(const std::string& path, std::string_view content, unsigned mode, std::string& reason) {
-  return createAnew(path, content, mode, false, reason);
+  return createAnew(path, asParts(content), mode, false, reason);
 }
 
 bool replaceFile(const std::string& path, std::string_view content, std::string& reason,
+                 std::string_view temporaryEnding) {
+  return replaceFile(path, asParts(content), reason, temporaryEnding);
+}
+
+bool hasContent(const std::string& path, const TextParts& content) {
+  const Descriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
+  struct stat status {};
+  if (file.get() < 0 || ::fstat(file.get(), &status) != 0 || !S_ISREG(status.st_mode)) return false;
+  std::string found;
+  for (std::string_view part = content(); !part.empty(); part = content()) {
+    found.resize(part.size());
+    for (std::size_t size = 0; size < part.size();) {
+      const ssize_t got = ::read(file.get(), found.data() + size, part.size() - size);
+      if (got < 0 && errno == EINTR) continue;
+      if (got <= 0) return false;
+      size += static_cast<std::size_t>(got);
+    }
+    if (found != part) return false;
+  }
+  char more = 0;
+  return ::read(file.get(), &more, 1) == 0;
+}
+
+bool replaceFile(const std::string& path, const TextParts& content, std::string& reason,
                  std::string_view temporaryEnding) {
   const std::string temporary = path + std::string(temporaryEnding);
   struct stat status {};

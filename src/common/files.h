@@ -2,6 +2,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <functional>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -47,5 +48,14 @@ inline constexpr std::string_view kTemporaryEnding = ".tmp";
 /// Programs that may replace the same file at once give each a temporary name with an ending of its own.
 bool replaceFile(const std::string& path, std::string_view content, std::string& reason,
                  std::string_view temporaryEnding = kTemporaryEnding);
+
+/// A text a part at a time: each call returns the next part, which holds until the following call, and an empty one at
+/// the end.
+using TextParts = std::function<std::string_view()>;
+/// The same with a large content.
+bool replaceFile(const std::string& path, const TextParts& content, std::string& reason,
+                 std::string_view temporaryEnding = kTemporaryEnding);
+/// Whether the file has this content, of which no more is asked for than it takes to tell.
+bool hasContent(const std::string& path, const TextParts& content);
 
 }  // namespace mirevo

@@ -50,6 +50,8 @@ inline constexpr RunFile kBand{.stem = "_Band_", .extension = ".csv", .isNumbere
 /// Beside a band of the simulated values: that of what would be observed, with the errors.
 inline constexpr RunFile kTotalBand{
     .stem = "_TotalBand_", .extension = ".csv", .isNumbered = true, .mark = "# Band of "};
+inline constexpr RunFile kSobolSeries{
+    .stem = "_SobolSeries_", .extension = ".csv", .isNumbered = true, .mark = "# Sobol' indices of "};
 inline constexpr RunFile kSavedFolder{"_Saved", ""};
 /// These two stand beside the setup, or in the folder that it names for them.
 inline constexpr RunFile kFailedFolder{"_Failed", "", true};
@@ -68,6 +70,7 @@ inline constexpr RunFile kCorrelation{"_Correlation", ".dat", false, true};
 inline constexpr RunFile kParameterLimits{"_ParameterLimits", ".dat", false, true};
 inline constexpr RunFile kJacobian{"_Jacobian", ".dat", false, true};
 inline constexpr RunFile kSensitivities{"_Sensitivities", ".dat", false, true};
+inline constexpr RunFile kMorris{"_Morris", ".dat", false, true};
 inline constexpr RunFile kQuantiles{"_Quantiles", ".dat", false, true};
 inline constexpr RunFile kSampleCorrelation{"_SampleCorrelation", ".dat", false, true};
 inline constexpr RunFile kChains{"_Chains", ".dat", false, true};
@@ -76,7 +79,10 @@ inline constexpr RunFile kMarginals{"_Marginals", ".dat", false, true};
 inline constexpr RunFile kConvergence{"_Convergence", ".dat", false, true};
 inline constexpr std::array kUncertaintyTables{kQuantiles, kSampleCorrelation, kChains,
                                                kPosterior, kMarginals,         kConvergence};
-inline constexpr std::array kSensitivityTables{kCovariance, kCorrelation, kParameterLimits, kJacobian, kSensitivities};
+inline constexpr RunFile kSobol{"_Sobol", ".dat", false, true};
+inline constexpr RunFile kSobolConvergence{"_SobolConvergence", ".dat", false, true};
+inline constexpr std::array kSensitivityTables{kCovariance,    kCorrelation, kParameterLimits, kJacobian,
+                                               kSensitivities, kMorris,      kSobol,           kSobolConvergence};
 
 /// What all tasks call alike behind their own stem.
 constexpr RunFile restartFile(std::string_view stem) {

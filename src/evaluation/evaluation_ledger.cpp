@@ -217,6 +217,9 @@ void EvaluationLedger::tellOfRun(const EvaluationResult& result, std::string_vie
   if (!leftBehind.empty()) observer_.processesLeft(std::string(front).append(leftBehind));
   warnOfUnusedObservations(result);
   for (const std::string& text : result.warnings) observer_.warning(front + text);
+  for (const FileDoubt& doubt : result.doubts) {
+    if (toldDoubts_.emplace(doubt.file, doubt.place).second) observer_.warning(front + doubt.text);
+  }
   for (const UnkeptFile& file : result.absentFiles) observer_.fileAbsent(file.name, front + file.reason);
 }
 
@@ -237,6 +240,12 @@ void EvaluationLedger::finishRepeated(std::size_t place, EvaluationResult known,
         fmt::format("{} was made again{}: the model run failed: {}", progress::nameOfEvaluation(result.number),
                     isFinalRun_ ? "" : " for its pairs, and further runs are compared with the next successful one",
                     result.failure->reason));
+  }
+  if (isFinalRun_ && result.ok() && known.ok() && result.measureValues != known.measureValues) {
+    observer_.urgentWarning(
+        fmt::format("{}, the final model run, was made again and has other results than in its row, "
+                    "which is kept: the model depends on more than its parameters",
+                    progress::nameOfEvaluation(result.number)));
   }
   replay(place, std::move(known));
 }

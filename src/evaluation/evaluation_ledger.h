@@ -142,9 +142,10 @@ class EvaluationLedger final {
   std::set<std::size_t> repeats_;            ///< open sets whose result is that of an earlier model run
   std::size_t finishedCount_ = 0;            ///< open sets that have a result
   std::size_t runningCount_ = 0;             ///< sets that were taken and have no result
-  std::set<std::pair<int, std::size_t>> warnedOf_;  ///< evaluations and measures with unused observations
-  std::map<std::size_t, std::size_t> fewestUsed_;   ///< by measure, the fewest observations used of which a warning was
-                                                    ///< given
+  std::set<std::pair<std::size_t, std::size_t>> toldDoubts_;  ///< by file and place, see FileDoubt
+  std::set<std::pair<int, std::size_t>> warnedOf_;            ///< evaluations and measures with unused observations
+  std::map<std::size_t, std::size_t> fewestUsed_;  ///< by measure, the fewest observations used of which a warning was
+                                                   ///< given
 };
 
 /// Evaluator::settleAggregates() of the evaluators that run models; reports the scales found as messages.

@@ -10,6 +10,7 @@
 #include "evaluation/saved_files.h"
 #include "measures/file_form.h"
 #include "measures/period_series.h"
+#include "measures/series_tables.h"
 
 namespace mirevo {
 
@@ -123,6 +124,7 @@ struct EvaluationResult {
   /// Of a run that RunComparison::judge() may find to be cut off, the last lines that its batch printed.
   std::vector<std::string> lastOutput;
   std::vector<std::string> warnings;    ///< warnings for the log, one line each
+  std::vector<FileDoubt> doubts;        ///< told once in a run, whichever process has read the file
   std::vector<UnkeptFile> unkeptFiles;  ///< output files that the model run has left and that could not be kept
   std::vector<UnkeptFile> absentFiles;  ///< output files that are to be kept and that the model run has not left
 

@@ -297,14 +297,17 @@ std::optional<EvaluationFailure> OutputReader::readMeasures(const OutputFiles& f
     std::string reason;
     std::vector<std::string> doubts;
     std::optional<MeasureFile> file = readNumbers(files, reason, doubts);
-    if (file && !doubts.empty() && !std::exchange(hasToldDoubts_, true)) result.warnings = std::move(doubts);
+    if (file && !doubts.empty() && !std::exchange(hasToldDoubts_, true)) {
+      const std::size_t behindSeries = files.simulationFiles.size();
+      for (std::string& doubt : doubts) result.doubts.push_back({behindSeries, result.doubts.size(), std::move(doubt)});
+    }
     if (!file) return failureOf(Kind::resultsNotReadable, std::move(reason));
     written = std::move(*file);
   }
   if (auto unusable = series_.tryOpenSimulationFiles(files.simulationFiles)) {
     return failureOf(Kind::resultsNotReadable, std::move(*unusable));
   }
-  for (std::string& doubt : series_.takeDoubts()) result.warnings.push_back(std::move(doubt));
+  for (FileDoubt& doubt : series_.takeDoubts()) result.doubts.push_back(std::move(doubt));
   std::optional<EvaluationFailure> failure;
   std::vector<std::optional<FileForm>> forms(files.simulationFiles.size());
   bool hasForm = false;  // of the output-measure file

@@ -11,9 +11,13 @@ struct Layout<EvaluationResult> {
   static void of(auto& archive, auto& result) {
     archive(result.measureValues, result.objectiveValues, result.aggregate, result.validationValues,
             result.validationPairs, result.exactMeasures, result.simulatedValues, result.failure,
-            result.unusedObservations, result.pairs, result.lastOutput, result.warnings, result.unkeptFiles,
-            result.absentFiles, result.shownSeries);
+            result.unusedObservations, result.pairs, result.lastOutput, result.warnings, result.doubts,
+            result.unkeptFiles, result.absentFiles, result.shownSeries);
   }
+};
+template <>
+struct Layout<FileDoubt> {
+  static void of(auto& archive, auto& doubt) { archive(doubt.file, doubt.place, doubt.text); }
 };
 template <>
 struct Layout<UnkeptFile> {

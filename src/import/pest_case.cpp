@@ -76,6 +76,10 @@ class PestImport final {
                 fmt::format("the search by derivatives has no counterpart: with Option = 'optimisation' the setup "
                             "searches by {} with {} model runs, to be chosen by you",
                             task.algorithm, task.evaluations));
+    notes().add(
+        NoteKind::noCounterpart, place,
+        "covariance and limits of the parameters: Calculate_Covmatrix takes time series alone, and each observation "
+        "is a single number");
     takeOptions();
   }
 

@@ -237,6 +237,27 @@ std::optional<std::size_t> InstructionFile::placeOf(std::string_view name) const
 
 namespace {
 
+/// Digits with thousands marks, "-1,234,567.8", or with a decimal comma, "3,14".
+bool isOneNumberWithCommas(std::string_view text) {
+  const auto takeDigits = [&text] {
+    const std::size_t count = std::min(text.find_first_not_of("0123456789"), text.size());
+    text.remove_prefix(count);
+    return count;
+  };
+  if (!text.empty() && (text.front() == '-' || text.front() == '+')) text.remove_prefix(1);
+  const std::size_t front = takeDigits();
+  std::size_t groups = 0;
+  bool areOfThree = front <= 3;
+  for (; takeText(text, ","); ++groups) {
+    const std::size_t count = takeDigits();
+    if (count == 0) return false;
+    areOfThree = areOfThree && count == 3;
+  }
+  if (front == 0 || groups == 0) return false;
+  if (areOfThree && takeText(text, ".")) takeDigits();
+  return text.empty() && (areOfThree || groups == 1);
+}
+
 /// Goes through a listing as the instructions say.
 class ListingReader final {
  public:
@@ -274,6 +295,17 @@ class ListingReader final {
   };
   const std::optional<Cut>& firstCut() const { return firstCut_; }
   std::size_t cutCount() const { return cutCount_; }
+
+  /// A number that ended at a comma between digits, behind which nothing is read.
+  struct EndedAtComma {
+    std::size_t lineNumber = 0;
+    std::size_t column = 0;  ///< 1-based
+    const Instruction* instruction = nullptr;
+    std::string whole = {};
+    std::string taken = {};
+  };
+  const std::optional<EndedAtComma>& firstAtComma() const { return firstAtComma_; }
+  std::size_t atCommaCount() const { return atCommaCount_; }
 
  private:
   bool fail(std::string text) {
@@ -420,6 +452,7 @@ class ListingReader final {
     }
     std::size_t end = begin;
     while (end < line_.size() && !separates(line_[end])) ++end;
+    noteComma(begin, end);
     return take(line_.substr(begin, end - begin), end);
   }
 
@@ -442,7 +475,23 @@ class ListingReader final {
       return fail(fmt::format("the marker behind the number begins within {}: expected one that leaves it whole",
                               shortQuoted(tokenAround(end))));
     }
+    noteComma(at_, end);
     return take(line_.substr(at_, end - at_), end);
+  }
+
+  /// In a list of numbers the comma separates; "1,234.5" and "3,14" may as well be a number with a thousands mark or a
+  /// decimal comma. An instruction that reads on behind the comma says that it separates.
+  void noteComma(std::size_t begin, std::size_t end) {
+    const bool readsOn = next_ != nullptr && (next_->kind == Kind::nextNumber || next_->kind == Kind::touchingColumns ||
+                                              next_->text.find(',') != std::string::npos);
+    if (!current_->name || readsOn || (begin > 0 && line_[begin - 1] == ',')) return;
+    const auto last = std::find_if(line_.begin() + static_cast<std::ptrdiff_t>(end), line_.end(), isBlank);
+    const std::string_view whole = line_.substr(begin, static_cast<std::size_t>(last - line_.begin()) - begin);
+    if (!isOneNumberWithCommas(whole)) return;
+    ++atCommaCount_;
+    if (firstAtComma_) return;
+    firstAtComma_ = EndedAtComma{lineNumber_, begin + 1, current_, std::string(whole),
+                                 std::string(line_.substr(begin, end - begin))};
   }
 
   /// `dum` may stand for anything.
@@ -477,6 +526,8 @@ class ListingReader final {
   bool isBehindMarker_ = false;
   std::optional<Cut> firstCut_;
   std::size_t cutCount_ = 0;
+  std::optional<EndedAtComma> firstAtComma_;
+  std::size_t atCommaCount_ = 0;
   std::string fault_;
 };
 
@@ -505,6 +556,17 @@ std::optional<std::vector<double>> InstructionFile::read(const std::string& sour
     doubts->push_back(fmt::format("{}:{}:{}: the columns {}:{} cut {}, of which {} is read ({}:{}:{}){}", sourceName,
                                   cut->lineNumber, at.first, at.first, at.last, shortQuoted(cut->number),
                                   shortQuoted(cut->taken), sourceName_, at.line, at.column, more));
+  }
+  if (const auto& found = reader.firstAtComma(); found && doubts != nullptr) {
+    const Instruction& at = *found->instruction;
+    const std::string more =
+        reader.atCommaCount() > 1 ? fmt::format("; so are {} more read", reader.atCommaCount() - 1) : "";
+    doubts->push_back(
+        fmt::format("{}:{}:{}: of {} only {} is read, as a comma ends a number: if it marks thousands or decimals, let "
+                    "the model write "
+                    "numbers without; if it separates, read on behind it, as with !dum! ({}:{}:{}){}",
+                    sourceName, found->lineNumber, found->column, shortQuoted(found->whole), shortQuoted(found->taken),
+                    sourceName_, at.line, at.column, more));
   }
   return values;
 }

@@ -361,7 +361,9 @@ std::optional<std::string> SeriesTables::tryOpenSimulationFiles(std::span<const 
     // Whether columns cut a number depends on how long it is, and header rows may be lacking.
     if (simulationFiles_[i].listing || simulationFiles_[i].form.isGiven) {
       const std::vector<std::string> doubts = series->doubts();
-      for (; toldDoubts_[i] < doubts.size(); ++toldDoubts_[i]) newDoubts_.push_back(doubts[toldDoubts_[i]]);
+      for (; toldDoubts_[i] < doubts.size(); ++toldDoubts_[i]) {
+        newDoubts_.push_back({i, toldDoubts_[i], doubts[toldDoubts_[i]]});
+      }
     }
     simulations_.push_back(std::move(series));
   }

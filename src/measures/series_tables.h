@@ -23,6 +23,13 @@ struct ComparedItems {
   std::string observed;  ///< with the time span of its file
 };
 
+/// Something in a file that a model run wrote that may not mean what it is read as.
+struct FileDoubt {
+  std::size_t file = 0;   ///< which one of those that model runs write
+  std::size_t place = 0;  ///< among the doubts about that file, the same for the same doubt about another run's
+  std::string text;       ///< one line for the log
+};
+
 /// The opened time-series files of the run: every distinct observation file, open for the whole run, and every distinct
 /// simulation file, open only while the measures of one evaluation are computed.
 class SeriesTables final {
@@ -44,8 +51,8 @@ class SeriesTables final {
   /// the run.
   std::optional<std::string> tryOpenSimulationFiles(std::span<const std::string> paths);
   void releaseSimulationFiles();
-  /// What is doubtful in listings that were opened for evaluations, and was not in one before; told once.
-  std::vector<std::string> takeDoubts() { return std::exchange(newDoubts_, {}); }
+  /// What is doubtful in text files that were opened for evaluations, and was not in one before; told once.
+  std::vector<FileDoubt> takeDoubts() { return std::exchange(newDoubts_, {}); }
   /// Limits how long files are read.
   ReadingWatch& watch();
   /// Ends the process that reads files of some formats, if there is one.
@@ -103,7 +110,7 @@ class SeriesTables final {
   std::vector<ComparedItems> comparedItems_;       ///< one per measure
   std::vector<std::vector<int>> simulationItems_;  ///< one per simulation file: the item numbers in use
   std::vector<std::size_t> toldDoubts_;            ///< one per simulation file: how many were told
-  std::vector<std::string> newDoubts_;
+  std::vector<FileDoubt> newDoubts_;
   std::vector<std::uintmax_t> usualSizes_;  ///< one per simulation file: as it was found at the start
   std::shared_ptr<SeriesReading> reading_;
   std::vector<std::unique_ptr<TimeSeriesObject>> observations_;

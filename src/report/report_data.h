@@ -9,6 +9,8 @@
 
 #include "evaluation/evaluation_result.h"
 #include "report/failure_reasons.h"
+#include "report/report_morris.h"
+#include "report/report_sobol.h"
 #include "report/series_above.h"
 #include "report/series_labels.h"
 #include "run/results/run_record.h"
@@ -179,6 +181,8 @@ struct ReportData {
   std::vector<ShownSeries> wholeSeries;  ///< `series` from the first to the last period; empty without `periods`
   std::vector<ReportedBand> bands;
   std::optional<ReportedSensitivity> sensitivity;
+  std::vector<ReportedScreening> morris;
+  std::optional<ReportedSobol> sobol;
   std::vector<std::string> summary;  ///< the closing lines of the result file
 };
 

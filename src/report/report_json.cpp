@@ -375,6 +375,8 @@ std::string reportJson(const ReportData& data) {
   writeValidation(json, data);
   writeBands(json, data);
   if (data.sensitivity) writeSensitivity(json, *data.sensitivity);
+  if (!data.morris.empty()) writeMorris(json, data.morris);
+  if (data.sobol) writeSobol(json, *data.sobol);
   json.member("summary", data.summary).endObject();
   return json.take();
 }

@@ -467,6 +467,16 @@ void ReportBuilder::addAnalyses() {
         band.mostRuns = analysed.value_or(static_cast<int>(std::count(ok.begin(), ok.end(), true)));
     }
   }
+  if (task.hasMorris && hasAnalysis) {
+    std::string fault;
+    data_.morris = reportedMorris(filePrefix_, fault);
+    if (!fault.empty()) note(fmt::format("The screening is not shown: {}.", fault));
+  }
+  if (task.sobol != nullptr && hasAnalysis) {
+    std::vector<std::string> faults;
+    data_.sobol = reportedSobol(config_, filePrefix_, pairLabels(), faults);
+    for (const std::string& fault : faults) note(fault + ".");
+  }
   if (task.sensitivity != nullptr) {
     data_.sensitivity = reportedSensitivity(config_, *task.sensitivity, space(), sources_.results.rows, pairsOfRuns());
   }

@@ -347,8 +347,8 @@ TaskContext RunDriver::taskContext() {
           config_.validationPeriods};
 }
 
-TaskOutcome RunDriver::runTask() {
-  if (!config_.task) return {std::string(kEndOfTask)};
+const TaskOutcome& RunDriver::runTask() {
+  if (!config_.task) return outcome_.emplace(TaskOutcome{std::string(kEndOfTask)});
   outcome_ = config_.task->run(taskContext());
   const bool hasWorkers = state_.job->hasWorkers();
   const int slots = hasWorkers ? state_.job->processCount() - 1 : config_.simultaneousSimulations;

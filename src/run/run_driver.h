@@ -66,7 +66,7 @@ class RunDriver final {
   void openResults();
   void putEarlierReportAside();
   /// Runs the task, if there is one, and writes its files.
-  TaskOutcome runTask();
+  const TaskOutcome& runTask();
   void writeFiles(std::span<const TaskFile> files);
   TaskContext taskContext();
   /// At an early end: logs and writes the statistics of what succeeded, and returns their lines for the result file.

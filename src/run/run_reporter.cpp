@@ -176,6 +176,7 @@ void RunReporter::evaluationReplayed(std::span<const double> set, const Evaluati
   const bool lacksPairs = pairs_ != nullptr && !result.pairs.empty() && !pairs_->has(result.number);
   if (lacksPairs) pairs_->add(result.number, result.pairs);
   const std::vector<double> values = ToModelScale(space_, set);
+  if (searchHasEnded_ && result.ok()) compareFinalRun(result);
   if (result.pairs.empty()) {
     noteReplayWithoutPairs(result.number);
   } else {
@@ -193,13 +194,29 @@ void RunReporter::evaluationReplayed(std::span<const double> set, const Evaluati
 }
 
 void RunReporter::compareFinalRun(const EvaluationResult& result) {
-  const auto row = repeatCount_ > 0 && best() ? results_.rowOf(best()->number) : std::nullopt;
+  const auto row = best() ? results_.rowOf(best()->number) : std::nullopt;
   if (!row || row->measures == result.measureValues) return;
+  const std::string start =
+      fmt::format("The final model run has other results than evaluation No. {} of the same set", best()->number);
+  if (repeatCount_ > 0) {
+    urgentWarning(
+        fmt::format("{}, and {} have the results of earlier ones: a model that draws random numbers needs "
+                    "Reuse_Results = 0 in MIREVO_SIMULATION_OPTION",
+                    start, countText(static_cast<std::size_t>(repeatCount_), "evaluation")));
+    return;
+  }
   urgentWarning(
-      fmt::format("The final model run has other results than evaluation No. {} of the same set, and {} have the "
-                  "results of earlier "
-                  "ones: a model that draws random numbers needs Reuse_Results = 0 in MIREVO_SIMULATION_OPTION",
-                  best()->number, countText(static_cast<std::size_t>(repeatCount_), "evaluation")));
+      fmt::format("{}{}: the model depends on more than its parameters, such as random numbers, the time or "
+                  "files that it changes. Its process folder has the results of the final run",
+                  start, firstDifference(row->measures, result.measureValues)));
+}
+
+/// " (flow: 2.5 instead of 2.25)".
+std::string RunReporter::firstDifference(std::span<const double> expected, std::span<const double> found) const {
+  const auto [was, is] = std::ranges::mismatch(expected, found);
+  const auto place = static_cast<std::size_t>(was - expected.begin());
+  if (was == expected.end() || is == found.end() || place >= sources_.size()) return {};
+  return fmt::format(" ({}: {} instead of {})", sources_[place].name, formatReal(*is), formatReal(*was));
 }
 
 void RunReporter::runCompared(const ComparisonFindings& found) {

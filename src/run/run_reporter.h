@@ -130,8 +130,9 @@ class RunReporter final : public EvaluationObserver {
   void considerAsBest(int number, double aggregate, const std::vector<double>& parameterValues,
                       std::string_view foundAt);
   void requireLogWritten() const;
-  /// Results of earlier evaluations are right only for a model that gives them again.
+  /// Results are right only for a model that gives them again, those of earlier evaluations as well.
   void compareFinalRun(const EvaluationResult& result);
+  std::string firstDifference(std::span<const double> expected, std::span<const double> found) const;
   void noteReplayWithoutPairs(int number);
   bool isReplayedWithoutPairs(int number) const;
   void record(const std::vector<double>& values, const EvaluationResult& result, std::optional<int> repeats);

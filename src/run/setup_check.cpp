@@ -13,6 +13,7 @@
 #include "common/fatal_error.h"
 #include "common/run_files.h"
 #include "common/text.h"
+#include "common/utf8.h"
 #include "evaluation/local_evaluator.h"
 #include "measures/item_names.h"
 #include "platform/processes/child_guard.h"
@@ -38,8 +39,9 @@ class SetupCheck final {
   int exitCode() const { return exitCode_; }
 
  private:
+  /// Names and contents of files may be in any encoding.
   void print(std::string_view text) {
-    if (writeAnswer(std::string(text) + "\n") != 0) exitCode_ = 1;
+    if (writeAnswer(withValidUtf8(text) + "\n") != 0) exitCode_ = 1;
   }
   void warn(std::string_view record) {
     ++warningCount_;
@@ -106,7 +108,8 @@ void SetupCheck::judgeRun(ModelRunner& runner, ProcessLauncher& launcher, std::s
   const EvaluationResult result = resultOf(runner, launcher, set);
   print(fmt::format("It took {:.2f} s, with the reading of its results", runTimeClock() - began));
   for (const std::string& text : result.warnings) log_.warning(text);
-  for (const UnusedObservations& unused : result.unusedObservations) print(unused.text);
+  for (const FileDoubt& doubt : result.doubts) log_.warning(doubt.text);
+  for (const UnusedObservations& unused : result.unusedObservations) log_.warning(unused.text);
   if (const std::string left = launcher.leftBehind(1); !left.empty()) log_.warning(left);
   if (result.ok()) return printResult(result, runner);
   std::string detail = result.failure->reason;

@@ -4,6 +4,7 @@
 #include <cmath>
 #include <limits>
 
+#include <fmt/format.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -29,6 +30,31 @@ TEST(DataTable, TextsComeBackAsTheyWereWhateverTheyHold) {
   EXPECT_THAT(read.rows, ElementsAre(texts, std::vector(texts.rbegin(), texts.rend())));
   EXPECT_EQ(read.column("flow, m³/s"), 6U);
   EXPECT_EQ(readDataTable("\\xZZ\\q\\x2\\\n").columns, std::vector<std::string>{"xZZqx2\\"});
+}
+
+TEST(DataTable, RealsInColumnsAndPartsMakeTheSameText) {
+  DataTable cells{{}, {"all"}, {"Name", "a", "b"}, {}};
+  DataTable columns = cells;
+  columns.realColumns.resize(2);
+  constexpr int kRows = 60'000;  // more than one part
+  for (int i = 0; i < kRows; ++i) {
+    const std::string name = fmt::format("row {}", i);
+    const double b = i == 7 ? NAN : -i / 7.0;
+    cells.rows.push_back({name, 0.1 * i, b});
+    columns.rows.push_back({name});
+    columns.realColumns[0].push_back(0.1 * i);
+    columns.realColumns[1].push_back(b);
+  }
+  const std::string text = dataTableText(cells);
+  EXPECT_TRUE(dataTableText(columns) == text);
+  EXPECT_THAT(text.substr(0, 40), ::testing::StartsWith("# all\nName\ta\tb\nrow 0\t0\t0\nrow 1\t0.1\t"));
+  const std::string first[] = {"of a run"};
+  DataTableParts parts(columns, first);
+  std::string joined;
+  int count = 0;
+  for (std::string_view part = parts.next(); !part.empty(); part = parts.next(), ++count) joined += part;
+  EXPECT_GT(count, 1);
+  EXPECT_TRUE(joined == "# of a run\n" + text);
 }
 
 TEST(DataTable, NumbersComeBackAsTheSameBitsAndWholeRowsOnly) {

@@ -58,6 +58,20 @@ TEST_F(Files, WhatCannotBeReplacedStaysAndNothingIsLeftBeside) {
   EXPECT_EQ(folder_.read("a.txt"), "old");
 }
 
+TEST_F(Files, AreReplacedAndComparedAPartAtATime) {
+  const auto parts = [](std::vector<std::string_view> texts) {
+    return [texts, i = std::size_t{0}]() mutable { return i < texts.size() ? texts[i++] : std::string_view(); };
+  };
+  const std::string path = folder_ / "parts.txt";
+  EXPECT_FALSE(hasContent(path, parts({"one"})));
+  EXPECT_TRUE(replaceFile(path, parts({"one ", "two ", "three"}), reason_)) << reason_;
+  EXPECT_EQ(folder_.read("parts.txt"), "one two three");
+  EXPECT_TRUE(hasContent(path, parts({"one two", " three"})));
+  for (const char* other : {" thre", " threE", " three4"}) EXPECT_FALSE(hasContent(path, parts({"one two", other})));
+  EXPECT_TRUE(replaceFile(path, parts({}), reason_)) << reason_;
+  EXPECT_EQ(folder_.read("parts.txt"), "");
+}
+
 TEST_F(Files, HolesStayHolesInACopy) {
   constexpr std::uintmax_t kSize = 40'000'000'000;
   for (const bool hasData : {true, false}) {

@@ -433,6 +433,17 @@ TEST_F(LocalEvaluatorTest, WhatAnEarlierRunHasEvaluatedIsNotRunAgain) {
   results = evaluate(evaluator, {6.0}, DispatchMode::finalRun);
   EXPECT_EQ(launcher.starts, 3);
   EXPECT_EQ(observer_.events.back(), "replay 5 a=6 OK");
+  EXPECT_THAT(observer_.events, Not(Contains(HasSubstr("other results than in its row"))));
+}
+
+TEST_F(LocalEvaluatorTest, AFinalRunThatDiffersFromItsRowIsToldOf) {
+  FakeLauncher launcher([&](int, const std::string&) { return computes(1.5, 7.0); });
+  takeUp({{1, 6.0}});
+  evaluate(makeEvaluator(launcher, 1, 10), {6.0}, DispatchMode::finalRun);
+  EXPECT_THAT(observer_.events, Contains(AllOf(HasSubstr("warning at once: "), HasSubstr("No. 1, the final model run, "
+                                                                                         "was made again and has other "
+                                                                                         "results than in its row"))));
+  EXPECT_EQ(observer_.events.back(), "replay 1 a=6 OK");
 }
 
 /// An interrupted run has rows of sets behind one that had not ended.

@@ -142,13 +142,14 @@ TEST_F(ModelRunTest, InstructionsThatAListingDoesNotFitOrThatCutItsNumbersAreWar
                                                               "\"rms\" at i.ins:2:4)\nThis listing, as it is in"),
                         HasSubstr("A model run that writes such a one has failed"))));
   EXPECT_THAT(warnings("RMS 7.5\n"), ElementsAre());
+  const auto tellsOfCut = testing::Field(&FileDoubt::text, HasSubstr("the columns 5:7 cut \"17.51\""));
   writes("out/listing.txt", "RMS 17.51\n");
-  EXPECT_THAT(evaluate(2.0).warnings, ElementsAre(HasSubstr("the columns 5:7 cut \"17.51\"")));
+  EXPECT_THAT(evaluate(2.0).doubts, ElementsAre(tellsOfCut));
   EXPECT_THAT(warnings("RMS 17.51\n"), ElementsAre(HasSubstr(":1:5: the columns 5:7 cut \"17.51\", of which \"17.\"")));
   EXPECT_THAT(warnings(nullptr), ElementsAre());
   writes("out/listing.txt", "RMS 17.51\n");
-  EXPECT_THAT(evaluate(2.0).warnings, ElementsAre(HasSubstr("the columns 5:7 cut \"17.51\"")));
-  EXPECT_THAT(evaluate(2.0).warnings, ElementsAre());
+  EXPECT_THAT(evaluate(2.0).doubts, ElementsAre(tellsOfCut));
+  EXPECT_THAT(evaluate(2.0).doubts, ElementsAre());
 }
 
 TEST_F(ModelRunTest, SeveralListingsGiveOneListOfNumbersAndDifferencesToObservedValues) {

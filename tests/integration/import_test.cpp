@@ -51,6 +51,20 @@ TEST_F(ImportedRun, OfPestHasItsParametersFilesAndSumOfSquares) {
   EXPECT_NEAR(first, 4 + 144 + 0.2385 * 0.2385, 1e-9);
   EXPECT_LT(best, 5.0);
   EXPECT_EQ(import("src/case.pst").exitCode, 1) << "the folder exists";
+
+  // The covariance says what it leaves out.
+  std::string text = folder_.read("made/case.kdx");
+  const std::size_t section = text.find("[LOCAL_SA]") + 10;
+  folder_.write("made/covariance.kdx", text.insert(section, "\nCalculate_Covmatrix = 1"));
+  const std::string option = "Option = 'optimisation'";
+  ASSERT_NE(text.find(option), std::string::npos);
+  folder_.write("made/covariance.kdx", text.replace(text.find(option), option.size(), "Option = 'sensitivity'"));
+  const ProgramResult run = RunningProgram({folder_ / "made/covariance.kdx"}).wait();
+  EXPECT_EQ(run.exitCode, 0) << run.error;
+  EXPECT_THAT(
+      folder_.read("made/covariance.log"),
+      AllOf(HasSubstr("The covariance is of time series alone: 4 output measures with Observed_Value are not in it"),
+            HasSubstr("No covariance matrix: no objective function compares time series")));
 }
 
 TEST_F(ImportedRun, OfVersionTwoHasTheSame) {

@@ -51,7 +51,8 @@ fi)");
   int kind = 0;
   for (const RunSettings& settings :
        {RunSettings{.algorithm = 1, .usesSurrogate = true, .maxEvaluations = 60},
-        RunSettings{.search = "OPSE", .maxEvaluations = 60}, RunSettings{.option = 3, .maxEvaluations = 40}}) {
+        RunSettings{.search = "OPSE", .maxEvaluations = 60}, RunSettings{.search = "CMA-ES", .maxEvaluations = 60},
+        RunSettings{.option = 3, .maxEvaluations = 40}}) {
     ++kind;
     writeSetup(settings);
     run();
@@ -146,8 +147,10 @@ TEST_F(Restart, AFinishedRunIsWalkedThroughAndEndsWithTheSameFile) {
 }
 
 TEST_F(Restart, ARaisedBudgetTakesAFinishedSearchFurther) {
-  for (const RunSettings& settings :
-       {RunSettings{.algorithm = 0}, {.algorithm = 1, .usesSurrogate = true}, {.search = "OPSE"}}) {
+  for (const RunSettings& settings : {RunSettings{.algorithm = 0},
+                                      {.algorithm = 1, .usesSurrogate = true},
+                                      {.search = "OPSE"},
+                                      {.search = "CMA-ES"}}) {
     writeSetup(settings);
     run();
     folder_.editSetup("Max_No_Evaluations = 40", "Max_No_Evaluations = 70");

@@ -82,6 +82,22 @@ TEST(SetupCheck, ShowsEachMeasureItsOwnSeries) {
   }
 }
 
+TEST(SetupCheck, ShowsNamesInAnyEncodingAndWarnsOfObservationsThatAreNotUsed) {
+  const ModelFolder folder;
+  const std::string setup = folder.writeSetup({.option = 0});
+  folder.editSetup("Weight_Above = 1.0", "Weight_Above = 1.0\nTime_Offset = 24");
+  const std::string observed = folder.read("observed.csv");
+  folder.write("observed.csv", "time,Abflu\xDF" + observed.substr(observed.find('\n')));
+  const ProgramResult result = check(setup);
+  EXPECT_EQ(result.exitCode, 0) << result.error;
+  EXPECT_THAT(
+      result.output,
+      AllOf(HasSubstr("item No. 1 (Abflu\xEF\xBF\xBD)"), Not(HasSubstr("\xDF")),
+            HasSubstr("\nWarning: output measure \"flow\": 1 of 365 observations in the evaluation period are not "
+                      "used"),
+            HasSubstr("Nothing is wrong, but for 1 warning; ")));
+}
+
 TEST(SetupCheck, SaysWhatIsWrong) {
   struct Case {
     const char* from;

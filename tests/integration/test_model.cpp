@@ -15,6 +15,8 @@
 //   grandchild FILE     fork a process that ignores SIGTERM and stays; its id goes into FILE
 //   sleep-ms N          sleep
 //   fail-above X        exit with code 3 when a is greater than X
+//   fail-share X        exit with code 3 for about this share of the sets of x1, x2 ..., as if at random
+//   function NAME       write the value of "ishigami" or "g" at x1, x2 ... into `value.txt` instead of the series
 //
 // A file that cannot be read or written, or an unknown option, ends it with code 2 and a message on standard error.
 #include <algorithm>
@@ -26,11 +28,13 @@
 #include <cstdlib>
 #include <ctime>
 #include <fstream>
+#include <iomanip>
 #include <map>
 #include <sstream>
 #include <string>
 #include <string_view>
 #include <unistd.h>
+#include <vector>
 
 namespace {
 
@@ -42,8 +46,8 @@ namespace {
 class Settings {
  public:
   Settings(int argc, char** argv) {
-    static constexpr std::array<std::string_view, 5> kKnown{"--parameters", "--ignore-term", "--grandchild",
-                                                            "--sleep-ms", "--fail-above"};
+    static constexpr std::array<std::string_view, 7> kKnown{
+        "--parameters", "--ignore-term", "--grandchild", "--sleep-ms", "--fail-above", "--fail-share", "--function"};
     for (int i = 1; i < argc; i += 2) {
       if (i + 1 == argc || std::ranges::find(kKnown, argv[i]) == kKnown.end()) giveUp(argv[i]);
       values_[argv[i] + 2] = argv[i + 1];
@@ -92,6 +96,43 @@ void writeResults(double a, double b, double c) {
   if (std::fclose(file) != 0 || !isWritten) giveUp("cannot write simulated.csv");
 }
 
+/// x1, x2 ... of the file.
+std::vector<double> unknowns(const Settings& settings) {
+  std::vector<double> x;
+  std::string name = "x";
+  while (!settings.text(name.append(std::to_string(x.size() + 1))).empty()) {
+    x.push_back(settings.number(name));
+    name.resize(1);
+  }
+  return x;
+}
+
+/// Ishigami and Homma (1990) with a = 7 and b = 0.1, x in [-pi, pi]; the G function of Sobol' (1993) with a = 0,
+/// 1, 4.5, 9, 99 ..., x in [0, 1].
+void writeValue(const std::string& function, const std::vector<double>& x) {
+  double value = 1.0;
+  if (function == "ishigami" && x.size() == 3) {
+    value = std::sin(x[0]) + 7.0 * std::pow(std::sin(x[1]), 2) + 0.1 * std::pow(x[2], 4) * std::sin(x[0]);
+  } else if (function == "g") {
+    for (std::size_t j = 0; j < x.size(); ++j) {
+      static constexpr std::array kCoefficients{0.0, 1.0, 4.5, 9.0};
+      const double a = j < kCoefficients.size() ? kCoefficients[j] : 99.0;
+      value *= (std::abs(4.0 * x[j] - 2.0) + a) / (1.0 + a);
+    }
+  } else {
+    giveUp("no function " + function);
+  }
+  std::ofstream("value.txt") << std::setprecision(17) << value << '\n';
+}
+
+/// Whether this set is one of the share that fails: by digits behind those that matter to the value.
+bool isOfShare(double share, const std::vector<double>& x) {
+  double sum = 0.0;
+  for (const double value : x) sum += value;
+  double whole = 0.0;
+  return std::abs(std::modf(sum * 1.0e5, &whole)) < share;
+}
+
 }  // namespace
 
 int main(int argc, char** argv) {
@@ -106,6 +147,15 @@ int main(int argc, char** argv) {
   if (a > settings.number("fail-above", INFINITY)) {
     std::fprintf(stderr, "test_model: a = %g is too large\n", a);
     return 3;
+  }
+  const std::vector<double> x = unknowns(settings);
+  if (settings.number("fail-share") > 0.0 && isOfShare(settings.number("fail-share"), x)) {
+    std::fputs("test_model: this set fails\n", stderr);
+    return 3;
+  }
+  if (!settings.text("function").empty()) {
+    writeValue(settings.text("function"), x);
+    return 0;
   }
   writeResults(a, settings.number("b"), settings.number("c"));
   return 0;

@@ -8,6 +8,7 @@
 
 #include "common/text.h"
 #include "integration/model_folder.h"
+#include "integration/mpi_job.h"
 #include "matchers.h"
 
 namespace mirevo::testing {
@@ -54,6 +55,34 @@ NR > 1 { split($1, d, /[- ]/); printf "%2d/%2d/%4d %s\n", d[3], d[2], d[1], $2 }
   const ProgramResult result = runProgram({setup});
   ASSERT_EQ(result.exitCode, 0) << result.error << folder.read("basin.log");
   EXPECT_EQ(rowsOf(folder.read(kResults)), expected);
+}
+
+/// Numbers are longer in model runs than in the file that the model's folder has.
+TEST(TextForms, ColumnsThatCutANumberAreWarnedOfOnceHoweverARunIsMade) {
+  const ModelFolder folder;
+  const char* const form = "awk -F, 'NR > 1 { printf \"%.10s %6.DIGITSf  17.5\\n\", $1, $2 }' simulated.csv > run.out";
+  const auto formed = [form](const char* digits) {
+    return std::string(form).replace(std::string(form).find("DIGITS"), 6, digits);
+  };
+  for (const bool isJob : {false, true}) {
+    if (isJob && !mpirunIsInstalled()) continue;
+    for (const int slots : {1, 3}) {
+      if (isJob && slots == 1) continue;
+      const std::string setup = folder.writeSetup({.option = 3, .maxEvaluations = 12, .slots = slots});
+      folder.editSetup("'model/simulated.csv'\n          Item_No = 1",
+                       "'model/run.out'\nHeader_Rows = 0\nColumn_Widths = 11, 6, 20\nItem_No = 1");
+      const std::string whole = formed("3");
+      folder.write("model/run.sh", fmt::format("#!/bin/sh\n{} \"$@\" && {}\n", MIREVO_TEST_MODEL, whole), 0755);
+      ASSERT_EQ(std::system(fmt::format("cd '{}/model' && ./run.sh && rm simulated.csv", folder.path()).c_str()), 0);
+      folder.write("model/run.sh", fmt::format("#!/bin/sh\n{} \"$@\" && {}\n", MIREVO_TEST_MODEL, formed("9")), 0755);
+      const ProgramResult run = isJob ? startJob(3, {setup}).wait() : runProgram({setup});
+      EXPECT_EQ(run.exitCode, 0) << run.error << folder.read("basin.log");
+      const std::string log = folder.read("basin.log");
+      EXPECT_EQ(occurrences(log, "Column_Widths ends column 2 before character 18, between "), 1)
+          << slots << isJob << log;
+      EXPECT_THAT(log, HasSubstr("Warning: Evaluation of parameter set No. "));
+    }
+  }
 }
 
 TEST(TextForms, ARefusalTellsTheKeywordAndShowsTheFirstLines) {

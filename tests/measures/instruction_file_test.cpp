@@ -114,6 +114,38 @@ TEST(InstructionFile, TellsOfColumnsThatCutANumber) {
   }
 }
 
+TEST(InstructionFile, TellsOfNumbersThatEndAtACommaBetweenDigits) {
+  // Of a listing of one line what is said; nothing where the comma can only separate.
+  const std::tuple<const char*, const char*, const char*> cases[] = {
+      {"l1 w !x!", "sum 1,234.5",
+       "out.lst:1:5: of \"1,234.5\" only \"1\" is read, as a comma ends a number: if it marks thousands or decimals, "
+       "let "
+       "the model write numbers without; if it separates, read on behind it, as with !dum! (i.ins:2:6)"},
+      {"~sum~ !x!", "sum -12,345,678", "of \"-12,345,678\" only \"-12\" is read"},
+      {"~sum~ (x)5:9", "sum 1,234.5 m", "of \"1,234.5\" only \"1\" is read"},
+      {"~sum~ !x! w !y!", "sum 3,14 2,71", "of \"3,14\" only \"3\" is read, as a comma ends a number"},
+      {"~sum~ !x! w !y!", "sum 3,14 2,71", "(i.ins:2:7); so are 1 more read"},
+      {"~sum~ !x! !y!", "sum 1,234.5", ""},
+      {"~sum~ !x! !dum!", "sum 1,234.5", ""},
+      {"~sum~ !dum! !x!", "sum 1,234.5", ""},
+      {"~sum~ !x! ~,~", "sum 1,234.5", ""},
+      {"~sum~ !x!", "sum 1.5,234", ""},
+      {"~sum~ !x!", "sum 1,23,4", ""},
+      {"~sum~ !x!", "sum 2001,7,31", ""},
+      {"~sum~ !x!", "sum 1, 234.5", ""},
+      {"~sum~ !x!", "sum 1,,234", ""},
+  };
+  for (const auto& [lines, listing, expected] : cases) {
+    std::string reason;
+    std::vector<std::string> doubts;
+    const auto file = InstructionFile::parse("i.ins", std::string("pif ~\n") + lines, reason);
+    ASSERT_TRUE(file) << reason;
+    EXPECT_TRUE(file->read("out.lst", listing, reason, nullptr, &doubts)) << lines << ": " << reason;
+    EXPECT_EQ(doubts.size(), *expected == 0 ? 0U : 1U) << listing;
+    EXPECT_THAT(doubts.empty() ? std::string() : doubts.front(), HasSubstr(expected)) << listing;
+  }
+}
+
 TEST(InstructionFile, RefusesWhatIsNoInstruction) {
   const std::pair<const char*, const char*> cases[] = {
       {"", "i.ins: it is empty: expected \"pif ~\" in its first line"},

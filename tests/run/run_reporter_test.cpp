@@ -1,6 +1,7 @@
 #include "run/run_reporter.h"
 
 #include <cmath>
+#include <tuple>
 
 #include <fmt/format.h>
 #include <gmock/gmock.h>
@@ -73,6 +74,48 @@ TEST_F(RunReporterTest, TheBestOfASearchIsTheOneThatItTook) {
   finish(3, 4.0, std::log(2.0));  // the final model run of a model that does not repeat itself
   EXPECT_EQ(reporter_.best()->number, 2);
   EXPECT_DOUBLE_EQ(reporter_.best()->parameterValues.at(0), 2.0);
+}
+
+TEST_F(RunReporterTest, AFinalRunWithOtherResultsThanTheBestIsTold) {
+  std::string reason;
+  ASSERT_TRUE(results_.finish({}, reason)) << reason;
+  // Results of the best and of the final run, whether they are of an earlier run and whether an evaluation repeats
+  // another one; what is told.
+  const std::tuple<double, double, bool, bool, const char*> cases[] = {
+      {5.0, 5.0, false, false, nullptr},
+      {5.0, 4.5, false, false,
+       "The final model run has other results than evaluation No. 1 of the same set (flow: 4.5 instead of 5): the "
+       "model depends on more than its parameters"},
+      {5.0, 4.5, true, false, "of the same set (flow: 4.5 instead of 5)"},
+      {5.0, 4.5, false, true, "and 1 evaluation have the results of earlier ones"},
+  };
+  for (const auto& [best, final, isReplayed, hasRepeat, expected] : cases) {
+    SCOPED_TRACE(expected == nullptr ? "the same" : expected);
+    RunState state;
+    state.log.open(folder_ / "f.log", reason);
+    state.progress.progressInit(folder_ / "f.log", "");
+    ResultFile results{folder_ / "f_Checksums.dat", {"Title"}};
+    results.open(folder_ / "f.dat", {}, {{"k"}, {"flow"}, {"fit"}});
+    RunReporter reporter(state, results, failedRuns_, space_, nullptr, &pairs_, nullptr, {{"flow", "flow.txt"}});
+    const double set = 1.0;
+    const auto resultOf = [](int number, double value) {
+      return EvaluationResult{
+          .number = number, .measureValues = {value}, .objectiveValues = {value}, .aggregate = value};
+    };
+    reporter.recordEvaluation(std::span(&set, 1), resultOf(1, best));
+    reporter.evaluationFinished(std::span(&set, 1), resultOf(1, best));
+    if (hasRepeat) reporter.recordRepeat(std::span(&set, 1), resultOf(2, best), 1);
+    reporter.takeBestOf({.best = {set}, .bestResult = resultOf(1, best)});
+    reporter.recordEvaluation(std::span(&set, 1), resultOf(3, final));
+    if (isReplayed) {
+      reporter.evaluationReplayed(std::span(&set, 1), resultOf(3, final));
+    } else {
+      reporter.evaluationFinished(std::span(&set, 1), resultOf(3, final));
+    }
+    const std::vector<std::string>& told = state.log.warnings();
+    EXPECT_EQ(told.size(), expected == nullptr ? 0U : 1U);
+    EXPECT_THAT(told.empty() ? std::string() : told.front(), HasSubstr(expected == nullptr ? "" : expected));
+  }
 }
 
 TEST_F(RunReporterTest, AggregatesUnknownOnArrivalAreFilledInWhenTheTransformationIsSettled) {

@@ -77,7 +77,6 @@ WeightedModel weighRows(const LinearisedModel& model) {
   WeightedModel weighted;
   weighted.columns.resize(model.jacobian.size());
   weighted.noise.resize(model.jacobian.size(), 0.0);
-  std::vector<std::vector<double>> units(model.jacobian.size());  // of the entries of the columns
   std::vector<std::size_t> known;
   for (std::size_t j = 0; j < model.jacobian.size(); ++j) {
     const std::vector<double>& column = model.jacobian[j];
@@ -86,7 +85,7 @@ WeightedModel weighRows(const LinearisedModel& model) {
   }
   double products = 0.0;
   double squares = 0.0;
-  std::size_t before = model.residuals.size();  // the last row that was used
+  std::vector<std::size_t> used;  // rows
   for (std::size_t i = 0; i < model.residuals.size(); ++i) {
     if (!std::isfinite(model.residuals[i])) continue;
     if (!std::all_of(known.begin(), known.end(), [&](std::size_t j) { return std::isfinite(model.jacobian[j][i]); })) {
@@ -94,20 +93,27 @@ WeightedModel weighRows(const LinearisedModel& model) {
       continue;
     }
     const double root = model.weights.empty() ? 1.0 : std::sqrt(model.weights[i]);
-    const bool follows = before + 1 == i && (model.series.empty() || model.series[before] == model.series[i]);
+    const bool follows =
+        !used.empty() && used.back() + 1 == i && (model.series.empty() || model.series[used.back()] == model.series[i]);
     const double residual = root * model.residuals[i];
     if (follows) products += weighted.residuals.back() * residual;
     squares += residual * residual;
-    before = i;
+    used.push_back(i);
     weighted.residuals.push_back(residual);
-    for (std::size_t j = 0; j < model.jacobian.size(); ++j) {
+  }
+  std::vector<double> units;  // of the entries of a column
+  for (std::size_t j = 0; j < model.jacobian.size(); ++j) {
+    units.clear();
+    weighted.columns[j].reserve(used.size());
+    for (const std::size_t i : used) {
+      const double root = model.weights.empty() ? 1.0 : std::sqrt(model.weights[i]);
       weighted.columns[j].push_back(root * model.jacobian[j][i]);
       if (model.units.empty()) continue;
-      units[j].push_back(std::abs(root * model.units[i] / model.widths[j]));
-      weighted.noise[j] += roundingSquare(weighted.columns[j].back(), units[j].back());
+      units.push_back(std::abs(root * model.units[i] / model.widths[j]));
+      weighted.noise[j] += roundingSquare(weighted.columns[j].back(), units.back());
     }
+    weighted.lost.push_back(lostShare(weighted.columns[j], units));
   }
-  for (std::size_t j = 0; j < units.size(); ++j) weighted.lost.push_back(lostShare(weighted.columns[j], units[j]));
   if (squares > 0.0) weighted.lagOne = products / squares;
   return weighted;
 }
@@ -323,7 +329,7 @@ std::vector<DataTable> covarianceTables(const ParameterCovariance& covariance, c
   return tables;
 }
 
-DataTable jacobianTable(const LinearisedModel& model, const SearchSpace& space,
+DataTable jacobianTable(LinearisedModel model, const SearchSpace& space,
                         std::span<const ObservationLabel> observations) {
   DataTable table;
   table.file = run_files::kJacobian;
@@ -334,11 +340,17 @@ DataTable jacobianTable(const LinearisedModel& model, const SearchSpace& space,
   table.columns.insert(table.columns.end(), space.names.begin(), space.names.end());
   for (std::size_t i = 0; i < model.residuals.size(); ++i) {
     if (!std::isfinite(model.residuals[i])) continue;
-    auto& row = table.rows.emplace_back();
-    row = {observations[i].measure, observations[i].time, model.weights.empty() ? 1.0 : model.weights[i],
-           model.residuals[i]};
-    for (const std::vector<double>& column : model.jacobian) row.emplace_back(column[i]);
+    table.rows.push_back({observations[i].measure, observations[i].time, model.weights.empty() ? 1.0 : model.weights[i],
+                          model.residuals[i]});
   }
+  for (std::vector<double>& column : model.jacobian) {
+    std::size_t row = 0;
+    for (std::size_t i = 0; i < model.residuals.size(); ++i) {
+      if (std::isfinite(model.residuals[i])) column[row++] = column[i];
+    }
+    column.resize(row);
+  }
+  table.realColumns = std::move(model.jacobian);
   return table;
 }
 

@@ -80,8 +80,8 @@ struct ObservationLabel {
 };
 
 /// The linearised model as a table for programs, one row per observation that counts: its weight in W, its residual and
-/// its derivatives on the search scale. `observations` has one entry per row of the model.
-DataTable jacobianTable(const LinearisedModel& model, const SearchSpace& space,
+/// its derivatives on the search scale. `observations` has one entry per row of the model. Takes its Jacobian.
+DataTable jacobianTable(LinearisedModel model, const SearchSpace& space,
                         std::span<const ObservationLabel> observations);
 
 /// The covariance analysis as lines of text for the log, with a warning for each |r| > 0.95. Of more parameters than

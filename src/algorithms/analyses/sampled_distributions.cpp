@@ -4,13 +4,16 @@
 
 #include <fmt/format.h>
 
+#include "algorithms/numbers/sample_summary.h"
 #include "common/text.h"
 
 namespace mirevo {
 namespace {
 
-/// The 95 % quantile of the standard normal distribution.
-constexpr double kQuantile95 = 1.6448536269514722;
+/// The form in which earlier versions had all of them.
+bool isNormalOnSearchScale(const Distribution& distribution) {
+  return distribution.name() == "normal" && !distribution.isGivenOnModelScale();
+}
 
 bool isInteger(const SearchSpace& space, std::size_t j) {
   return space.transformation[j] == TransformationType::integer;
@@ -35,11 +38,9 @@ bool isMeanWithinBounds(const SearchSpace& space, std::size_t j, double mean) {
 }
 
 /// The share of the drawn values that the model gets within the bounds.
-double shareWithinBounds(const SearchSpace& space, std::size_t j, const NormalDistribution& distribution) {
-  const auto& [mean, deviation] = distribution;
+double shareWithinBounds(const SearchSpace& space, std::size_t j, const Distribution& distribution) {
   const double lower = space.lower[j] - (isInteger(space, j) ? 1.0 : 0.0);  // truncated upwards
-  const double scale = deviation * std::sqrt(2.0);
-  return 0.5 * (std::erf((space.upper[j] - mean) / scale) - std::erf((lower - mean) / scale));
+  return distribution.cumulative(space.upper[j]) - distribution.cumulative(lower);
 }
 
 /// The model takes the step below a drawn value, so that a mean on a step has half of its values on the step below.
@@ -64,52 +65,92 @@ std::string belowBoundText(const SearchSpace& space, std::size_t j, double lowes
       space.lower[j] - 1.0, space.lower[j] + 1.0, space.lower[j]);
 }
 
+std::string distributionLine(const Distribution& distribution, const SearchSpace& space, std::size_t j) {
+  const bool isLogarithm = space.transformation[j] == TransformationType::logarithmic;
+  std::string line = fmt::format("  PARAMETER_{}: {}, ", j + 1, space.names[j]);
+  if (!isNormalOnSearchScale(distribution)) line += fmt::format("{}, ", distribution.name());
+  line += distribution.text();
+  if (distribution.isGivenOnModelScale()) {
+    line += "; ";
+  } else {
+    line += fmt::format("{}; on the model scale ", isLogarithm ? " of the natural logarithm" : "");
+  }
+  const auto at = [&](double p) { return toModelScale(space, j, distribution.quantile(p)); };
+  if (!isInteger(space, j)) line += fmt::format("median {:.6g}, ", at(0.5));
+  return line + fmt::format("5 to 95 % from {:.6g} to {:.6g}", at(0.05), at(0.95));
+}
+
+/// Of a normal distribution whose mean is not between the bounds; else empty.
+std::string meanWarning(const Distribution& distribution, const SearchSpace& space, std::size_t j,
+                        const std::string& bounds) {
+  const double mean = distribution.quantile(0.5);
+  if (!isNormalOnSearchScale(distribution) || isMeanWithinBounds(space, j, mean)) return {};
+  const std::string onModelScale =
+      isInteger(space, j) ? "" : fmt::format(", on the model scale {:.6g}", toModelScale(space, j, mean));
+  std::string text = fmt::format("Mean_Value of PARAMETER_{} ({}) is {}{}: outside the {}", j + 1, space.names[j],
+                                 formatReal(mean), onModelScale, bounds);
+  const bool isLogarithm = space.transformation[j] == TransformationType::logarithmic;
+  if (isLogarithm && mean > 0.0 && isWithinBounds(space, j, std::log(mean))) {
+    text += fmt::format("; the mean of a logarithmic parameter is that of its natural logarithm, ln({}) = {:.6g}",
+                        formatReal(mean), std::log(mean));
+  }
+  return text;
+}
+
+/// Of a distribution most of whose values are outside the bounds; else empty.
+std::string shareWarning(const Distribution& distribution, const SearchSpace& space, std::size_t j,
+                         const std::string& bounds) {
+  constexpr double kHardlyMeant = 0.45;  // a mean on a bound leaves half
+  const double share = shareWithinBounds(space, j, distribution);
+  if (share > kHardlyMeant) return {};
+  const std::string what = isNormalOnSearchScale(distribution)
+                               ? fmt::format("Standard_Deviation of PARAMETER_{} ({}) is {:.10g}", j + 1,
+                                             space.names[j], distribution.atScore(1.0) - distribution.atScore(0.0))
+                               : fmt::format("Distribution of PARAMETER_{} ({})", j + 1, space.names[j]);
+  std::string text =
+      fmt::format("{}: about {:.0f} % of the values drawn are outside the {}", what, 100.0 * (1.0 - share), bounds);
+  const bool isLogarithm = space.transformation[j] == TransformationType::logarithmic;
+  if (isLogarithm && !distribution.isGivenOnModelScale() && !isNormalOnSearchScale(distribution)) {
+    text += "; it is that of the natural logarithm, unless Distribution_Scale = 'model'";
+  }
+  return text;
+}
+
 }  // namespace
 
-std::vector<std::string> distributionLines(const UncertaintySettings& settings, const SearchSpace& space) {
+std::vector<std::string> distributionLines(const ParameterDistributions& distributions, const SearchSpace& space) {
+  bool areNormal = true;
+  for (std::size_t j = 0; j < distributions.size(); ++j) {
+    areNormal = areNormal && isNormalOnSearchScale(distributions[j]);
+  }
   std::vector<std::string> lines{
-      "Normal distributions: PARAMETER_n of UNCERTAINTY_ESTIMATION is that of the n-th variable parameter"};
-  for (std::size_t j = 0; j < settings.parameters.size(); ++j) {
-    const auto& [mean, deviation] = settings.parameters[j];
-    const bool isLogarithm = space.transformation[j] == TransformationType::logarithmic;
-    std::string line =
-        fmt::format("  PARAMETER_{}: {}, mean {}, standard deviation {}{}; on the model scale ", j + 1, space.names[j],
-                    formatReal(mean), formatReal(deviation), isLogarithm ? " of the natural logarithm" : "");
-    if (!isInteger(space, j)) line += fmt::format("median {:.6g}, ", toModelScale(space, j, mean));
-    line += fmt::format("5 to 95 % from {:.6g} to {:.6g}", toModelScale(space, j, mean - kQuantile95 * deviation),
-                        toModelScale(space, j, mean + kQuantile95 * deviation));
-    lines.push_back(std::move(line));
-    if (!isInteger(space, j)) continue;
-    lines.push_back(integerLine(space, j, mean) + belowBoundText(space, j, mean - kQuantile95 * deviation));
+      fmt::format("{}: PARAMETER_n of UNCERTAINTY_ESTIMATION is that of the n-th variable parameter",
+                  areNormal ? "Normal distributions" : "Distributions")};
+  for (std::size_t j = 0; j < distributions.size(); ++j) {
+    lines.push_back(distributionLine(distributions[j], space, j));
+    if (!isInteger(space, j) || !isNormalOnSearchScale(distributions[j])) continue;
+    const double mean = distributions[j].quantile(0.5);
+    lines.push_back(integerLine(space, j, mean) + belowBoundText(space, j, distributions[j].quantile(0.05)));
+  }
+  if (!distributions.copula()) return lines;
+  const std::vector<std::vector<double>>& correlations = distributions.copula()->correlations();
+  lines.emplace_back("  Correlations of the normal scores:");
+  for (const auto& [i, j] : largestEntries(correlations)) {
+    if (correlations[i][j] == 0.0) break;
+    lines.back() += fmt::format("{} {} and {} {:.4g}", lines.back().ends_with(':') ? "" : ",", space.names[i],
+                                space.names[j], correlations[i][j]);
   }
   return lines;
 }
 
-std::vector<std::string> distributionWarnings(const UncertaintySettings& settings, const SearchSpace& space) {
-  constexpr double kHardlyMeant = 0.45;  // a mean on a bound leaves half
+std::vector<std::string> distributionWarnings(const ParameterDistributions& distributions, const SearchSpace& space) {
   std::vector<std::string> warnings;
-  for (std::size_t j = 0; j < settings.parameters.size(); ++j) {
-    const auto& [mean, deviation] = settings.parameters[j];
+  for (std::size_t j = 0; j < distributions.size(); ++j) {
     const std::string bounds =
         fmt::format("bounds {:.6g} to {:.6g}", toModelScale(space, j, space.lower[j]), modelUpperBound(space, j));
-    if (isMeanWithinBounds(space, j, mean)) {
-      const double share = shareWithinBounds(space, j, settings.parameters[j]);
-      if (share > kHardlyMeant) continue;
-      warnings.push_back(fmt::format(
-          "Standard_Deviation of PARAMETER_{} ({}) is {}: about {:.0f} % of the values drawn are outside the {}", j + 1,
-          space.names[j], formatReal(deviation), 100.0 * (1.0 - share), bounds));
-      continue;
-    }
-    const std::string onModelScale =
-        isInteger(space, j) ? "" : fmt::format(", on the model scale {:.6g}", toModelScale(space, j, mean));
-    std::string text = fmt::format("Mean_Value of PARAMETER_{} ({}) is {}{}: outside the {}", j + 1, space.names[j],
-                                   formatReal(mean), onModelScale, bounds);
-    const bool isLogarithm = space.transformation[j] == TransformationType::logarithmic;
-    if (isLogarithm && mean > 0.0 && isWithinBounds(space, j, std::log(mean))) {
-      text += fmt::format("; the mean of a logarithmic parameter is that of its natural logarithm, ln({}) = {:.6g}",
-                          formatReal(mean), std::log(mean));
-    }
-    warnings.push_back(std::move(text));
+    std::string warning = meanWarning(distributions[j], space, j, bounds);
+    if (warning.empty()) warning = shareWarning(distributions[j], space, j, bounds);
+    if (!warning.empty()) warnings.push_back(std::move(warning));
   }
   return warnings;
 }

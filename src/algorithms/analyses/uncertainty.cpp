@@ -118,42 +118,23 @@ const SettingSection<UncertaintySection>& uncertaintySection() {
   return section;
 }
 
-const SettingSection<NormalDistribution>& distributionSection() {
-  static const SettingSection<NormalDistribution> section{
-      {"UNCERTAINTY_ESTIMATION/PARAMETER_n",
-       "for each variable parameter",
-       "The normal distribution of the n-th *variable* parameter, counted in the order of `MODEL_PARAMETERS`.",
-       {setting<&NormalDistribution::mean>(
-            {.name = "Mean_Value",
-             .unit = "search scale",
-             .meaning = "Mean; that of the logarithm for a logarithmic parameter, half a step above "
-                        "the value meant for an integer parameter."}),
-        setting<&NormalDistribution::standardDeviation>(
-            {.name = "Standard_Deviation",
-             .range = kPositive,
-             .refusal = "Error: Standard deviation in uncertainty estimation invalid",
-             .unit = "search scale",
-             .meaning = "Standard deviation."})}}};
-  return section;
-}
-
 namespace {
 
 std::vector<ParameterSet> drawSample(const UncertaintySettings& settings, UniformGenerator& random,
                                      const MessageSink& messages) {
   const auto n = static_cast<std::size_t>(std::max(settings.sampleSize, 0));
-  std::vector<ParameterSet> sample(n, ParameterSet(settings.parameters.size()));
+  std::vector<ParameterSet> sample(n, ParameterSet(settings.distributions.size()));  // of points of the unit cube
   std::vector<double> deviates(n);
-  for (std::size_t j = 0; j < settings.parameters.size(); ++j) {
+  for (std::size_t j = 0; j < settings.distributions.size(); ++j) {
     for (double& deviate : deviates) deviate = random.next();
     if (settings.samplingType == SamplingType::latinHypercube) stratify(deviates, random);
-    const NormalDistribution& distribution = settings.parameters[j];
     for (std::size_t i = 0; i < n; ++i) {
       int fault = 0;
-      const double z = normalQuantile(deviates[i], fault, messages);
-      sample[i][j] = distribution.standardDeviation * z + distribution.mean;
+      if (!(deviates[i] < 1.0)) normalQuantile(deviates[i], fault, messages);
+      sample[i][j] = deviates[i];
     }
   }
+  for (ParameterSet& set : sample) set = settings.distributions.setAt(set);
   return sample;
 }
 

@@ -8,6 +8,7 @@
 #include <string_view>
 #include <vector>
 
+#include "algorithms/distributions/parameter_distributions.h"
 #include "algorithms/numbers/sample_summary.h"
 #include "algorithms/numbers/special_functions.h"
 #include "common/data_table.h"
@@ -19,12 +20,6 @@
 #include "parameters/search_space.h"
 
 namespace mirevo {
-
-/// The distribution of one variable parameter on the search scale; for a logarithmic parameter that of its logarithm.
-struct NormalDistribution {
-  double mean = 0.0;
-  double standardDeviation = 0.0;
-};
 
 enum class SamplingType : std::int32_t { simpleRandom = 0, latinHypercube = 1 };
 /// The forms of the uncertainty analysis; those that do not sample independently have a name only.
@@ -39,9 +34,9 @@ inline constexpr std::int32_t kMatrixLimit = 1000;
 
 struct UncertaintySettings {
   SamplingType samplingType = SamplingType::simpleRandom;
-  std::int32_t sampleSize = 0;                 ///< N, at least 2
-  std::vector<NormalDistribution> parameters;  ///< one per variable parameter, in setup order
-  bool redrawsInfeasible = false;              ///< whether sets that cannot be run are drawn again
+  std::int32_t sampleSize = 0;           ///< N, at least 2
+  ParameterDistributions distributions;  ///< of the variable parameters, in setup order
+  bool redrawsInfeasible = false;        ///< whether sets that cannot be run are drawn again
   BandTimes bandTimes = BandTimes::observations;
   std::optional<DateRecord> bandEnd;  ///< of the steps; empty: that of the evaluation period
   /// Of more parameters only the largest correlations are kept: the matrix grows with the square of their number.
@@ -61,11 +56,12 @@ struct UncertaintySection {
   std::int32_t& randomSeed;
 };
 const SettingSection<UncertaintySection>& uncertaintySection();
-/// Its sections PARAMETER_n.
-const SettingSection<NormalDistribution>& distributionSection();
 
-/// N sets drawn from independent normal distributions, not checked against the bounds. The stream starts afresh from
-/// the seed, whose sign does not matter. A deviate that has no quantile is reported to `messages` and yields the mean.
+/// N sets drawn from the distributions, not checked against the bounds: the deviates of the first parameter come first.
+/// With Latin hypercube sampling they are stratified; of parameters that are correlated, those of the first, and of the
+/// others the part that is not explained by those before. The stream starts afresh from the seed, whose sign does not
+/// matter. A deviate that is rounded to 1 has no normal quantile: that is reported to `messages`, and a normal
+/// distribution yields its mean.
 std::vector<ParameterSet> uncertaintySample(const UncertaintySettings& settings, std::int32_t seed,
                                             const MessageSink& messages = {});
 

@@ -1,30 +1,62 @@
 #include "algorithms/distributions/parameter_distributions.h"
 
+#include <cassert>
 #include <cmath>
-#include <limits>
+#include <utility>
+
+#include "algorithms/numbers/special_functions.h"
 
 namespace mirevo {
 
+ParameterDistributions::ParameterDistributions(std::vector<DistributionPointer> ofParameters,
+                                               std::optional<GaussianCopula> copula)
+    : ofParameters_(std::move(ofParameters)), copula_(std::move(copula)) {
+  assert(!copula_ || copula_->size() == size());
+}
+
 ParameterDistributions ParameterDistributions::uniform(const SearchSpace& space) {
-  ParameterDistributions made;
-  made.lower_ = space.lower;
-  made.upper_ = space.upper;
-  return made;
+  std::vector<DistributionPointer> made;
+  for (std::size_t j = 0; j < space.size(); ++j) made.push_back(uniformDistribution(space.lower[j], space.upper[j]));
+  return ParameterDistributions(std::move(made));
 }
 
 ParameterSet ParameterDistributions::setAt(std::span<const double> point) const {
+  assert(point.size() == size());
   ParameterSet set(size());
-  for (std::size_t j = 0; j < set.size(); ++j) set[j] = lower_[j] + point[j] * (upper_[j] - lower_[j]);
+  std::vector<double> scores;
+  if (copula_) {
+    for (const double p : point) {
+      int fault = 0;
+      scores.push_back(normalQuantile(p, fault));
+    }
+    scores = copula_->correlated(scores);
+  }
+  for (std::size_t j = 0; j < set.size(); ++j) {
+    const bool isCorrelated = copula_ && copula_->isCorrelated(j);
+    set[j] = isCorrelated ? ofParameters_[j]->atScore(scores[j]) : ofParameters_[j]->quantile(point[j]);
+  }
   return set;
 }
 
 double ParameterDistributions::logDensity(std::span<const double> set) const {
+  assert(set.size() == size());
   double sum = 0.0;
+  for (std::size_t j = 0; j < size(); ++j) sum += ofParameters_[j]->logDensity(set[j]);
+  if (!copula_ || std::isinf(sum)) return sum;
+  std::vector<double> scores(size());  // those of independent parameters do not count
   for (std::size_t j = 0; j < size(); ++j) {
-    if (set[j] < lower_[j] || set[j] > upper_[j]) return -std::numeric_limits<double>::infinity();
-    sum -= std::log(upper_[j] - lower_[j]);
+    if (!copula_->isCorrelated(j)) continue;
+    assert(ofParameters_[j]->isContinuous());
+    scores[j] = ofParameters_[j]->scoreOf(set[j]);
   }
-  return sum;
+  return sum + copula_->logDensity(scores);
+}
+
+std::optional<std::size_t> ParameterDistributions::firstWithoutDensity() const {
+  for (std::size_t j = 0; j < size(); ++j) {
+    if (!ofParameters_[j]->isContinuous()) return j;
+  }
+  return std::nullopt;
 }
 
 }  // namespace mirevo

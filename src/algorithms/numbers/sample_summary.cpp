@@ -142,10 +142,11 @@ DataTable matrixTable(const RunFile& file, std::string headLine, std::span<const
   table.headLines = {std::move(headLine)};
   table.columns = {"Parameter"};
   table.columns.insert(table.columns.end(), names.begin(), names.end());
-  for (std::size_t i = 0; i < matrix.size(); ++i) {
-    std::vector<DataTable::Cell>& row = table.rows.emplace_back();
-    row.emplace_back(names[i]);
-    row.insert(row.end(), matrix[i].begin(), matrix[i].end());
+  for (std::size_t i = 0; i < matrix.size(); ++i) table.rows.push_back({names[i]});
+  for (std::size_t j = 0; j < matrix.size(); ++j) {
+    std::vector<double>& column = table.realColumns.emplace_back();
+    column.reserve(matrix.size());
+    for (const std::vector<double>& row : matrix) column.push_back(row[j]);
   }
   return table;
 }

@@ -62,7 +62,7 @@ class Opse final : public PseMoves {
 };
 
 /// OPSE as a setup selects it.
-class OpseMethod final : public PopulationMethod {
+class OpseMethod final : public SimplexMethod {
  public:
   static const PseRefusals kRefusals;
 

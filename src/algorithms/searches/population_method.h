@@ -24,7 +24,11 @@ class PopulationMethod : public SearchMethod {
   /// With a raised budget the search continues as if the budget had been that large from the start.
   RaisedBudget raiseBudget(const SearchHistory& history, const StoppingCriteria& stopping,
                            const InitialSampleSettings& sample) const final;
+};
 
+/// One whose population moves by simplexes.
+class SimplexMethod : public PopulationMethod {
+ public:
   /// The subcomplex of SCE and the simplex of PSE are one setting.
   SimplexSettings simplex;
 };

@@ -29,7 +29,7 @@ class Pse final : public PseMoves {
 };
 
 /// PSE as a setup selects it.
-class PseMethod final : public PopulationMethod {
+class PseMethod final : public SimplexMethod {
  public:
   static const PseRefusals kRefusals;
 

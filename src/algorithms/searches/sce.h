@@ -80,7 +80,7 @@ class Sce final : public PopulationSearch {
 };
 
 /// SCE as a setup selects it.
-class SceMethod final : public PopulationMethod {
+class SceMethod final : public SimplexMethod {
  public:
   const SearchFacts& facts() const override;
   BoundSection section() override;

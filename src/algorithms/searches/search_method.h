@@ -71,6 +71,8 @@ class SearchMethod {
 
   /// Its section inside OPTIMISATION_ALGORITHM with its keywords, bound to this object's settings.
   virtual BoundSection section() = 0;
+  /// The number of variable parameters, on which defaults may depend; called once the section is read.
+  virtual void setVariableCount(std::size_t /*n*/) {}
   /// Settings that are small for n variable parameters.
   virtual std::vector<SearchAdvice> advice(std::size_t /*n*/) const { return {}; }
   /// Settings that are valid and of which it is certain that they make the search pointless.

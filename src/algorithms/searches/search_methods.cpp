@@ -5,6 +5,7 @@
 
 #include <fmt/format.h>
 
+#include "algorithms/searches/cma_es.h"
 #include "algorithms/searches/dds.h"
 #include "algorithms/searches/opse.h"
 #include "algorithms/searches/pdds.h"
@@ -15,7 +16,8 @@ namespace mirevo {
 
 const ChoiceTable<SearchMethod>& searchMethods() {
   /// A new search is added here.
-  static const auto searches = ChoiceTable<SearchMethod>::of<SceMethod, PseMethod, DdsMethod, PddsMethod, OpseMethod>();
+  static const auto searches =
+      ChoiceTable<SearchMethod>::of<SceMethod, PseMethod, DdsMethod, PddsMethod, OpseMethod, CmaEsMethod>();
   return searches;
 }
 

@@ -185,9 +185,8 @@ class Reduction final {
 
   bool isUnchanged(const std::string& path, const FolderListing::Entry& original, const struct stat& status) const {
     const FileState state = stateOf(status);
-    if (making_.links(original)) {
-      return state.device == original.state.device && state.inode == original.state.inode;
-    }
+    // On another disk there can be no link, and a copy is kept as any other.
+    if (making_.links(original) && state.device == original.state.device) return state.inode == original.state.inode;
     const CopyRecord* record = records_.of(path);
     if (record == nullptr || record->original != original.state || record->copy != state) return false;
     if (status.st_nlink != 1 || making_.isOwnFile(path)) return false;

@@ -42,12 +42,6 @@ std::optional<char> findSeparator(std::string_view header) {
   return std::nullopt;
 }
 
-bool isTimeOfDay(std::string_view cell) {
-  const auto hour = takeNumber(cell, 1, 2);
-  if (!hour || !takeText(cell, ":") || !takeNumber(cell, 2, 2)) return false;
-  return cell.empty() || cell.front() == ':';
-}
-
 constexpr std::string_view kOneColumn = "the date and the time of day must be in one column, such as 2001-01-31 12:30";
 
 /// What goes behind a fault in a row, if the cell that comes after the date or in place of a value is a time of day.
@@ -107,6 +101,7 @@ void CsvTimeSeries::clear() {
   times_.clear();
   cells_.clear();
   cellsItem_ = 1;
+  beginsWithTimeOfDay_ = false;
 }
 
 bool CsvTimeSeries::readPreamble(std::size_t& position) {
@@ -204,12 +199,16 @@ bool CsvTimeSeries::readRow(const char* line, const char* lineEnd, csv::DateScan
   }
   times_.push_back(static_cast<double>(second - startSecond_) / 86400.0);
   cells_.push_back(static_cast<std::size_t>(at + 1 - content_.data()));
+  if (cells_.size() == 1 && at != lineEnd) {
+    beginsWithTimeOfDay_ = isTimeOfDay(csv::cellText(at + 1, csv::endOfCell(at + 1, lineEnd, separator_)));
+  }
   return true;
 }
 
 std::vector<std::string> CsvTimeSeries::doubts() const {
   std::vector<std::string> doubts = marks_.doubts(sourceName_);
-  if (itemCount() < 2 || !isHeadingOfHours(itemName(1)) || !areDates(startSecond_, times_)) return doubts;
+  const bool mayBeHours = beginsWithTimeOfDay_ || isHeadingOfHours(itemCount() < 2 ? "" : itemName(1));
+  if (itemCount() < 2 || !mayBeHours || !areDates(startSecond_, times_)) return doubts;
   doubts.push_back(fmt::format("{}: column 2 is called {} and is read as item No. 1, not as a part of the time; {}",
                                sourceName_, quotedForMessage(itemName(1)), kOneColumn));
   return doubts;

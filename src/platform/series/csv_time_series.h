@@ -63,8 +63,9 @@ class CsvTimeSeries final : public StoredTimeSeries {
   char separator_ = ',';
   bool hasQuotes_ = false;  ///< in any row; without quotes a cell ends at the next separator
   MissingMarks marks_;
-  std::vector<std::size_t> cells_;  ///< one per row: where the cell of item cellsItem_ begins in the content
-  int cellsItem_ = 1;               ///< moves with getData(), so that items read in order are found at once
+  bool beginsWithTimeOfDay_ = false;  ///< the value of the first item in the first row
+  std::vector<std::size_t> cells_;    ///< one per row: where the cell of item cellsItem_ begins in the content
+  int cellsItem_ = 1;                 ///< moves with getData(), so that items read in order are found at once
 };
 
 }  // namespace mirevo

@@ -8,6 +8,8 @@
 #include <fmt/core.h>
 
 #include "common/files.h"
+#include "common/take_text.h"
+#include "common/utf8.h"
 #include "platform/series/series_reading.h"
 
 namespace mirevo {
@@ -66,6 +68,7 @@ std::optional<std::string_view> FileParts::nextLine() {
     line.remove_suffix(1);
     endsLine_ = true;
   }
+  if (!std::exchange(isBehindFirstLine_, true)) takeText(line, kByteOrderMark);
   return line;
 }
 

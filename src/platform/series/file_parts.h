@@ -21,8 +21,8 @@ class FileParts final {
 
   /// The next part, which holds until the following call; empty at the end and after a fault.
   std::string_view next();
-  /// The next line, without its end (LF or CRLF), which holds until the following call; empty optional at the end and
-  /// after a fault. Not to be mixed with next().
+  /// The next line, without its end (LF or CRLF) and a byte-order mark before the first, which holds until the
+  /// following call; empty optional at the end and after a fault. Not to be mixed with next().
   std::optional<std::string_view> nextLine();
   /// Whether the last line that nextLine() returned had an end.
   bool endsLine() const { return endsLine_; }
@@ -36,6 +36,7 @@ class FileParts final {
   std::string part_;
   std::string_view rest_;  ///< of the part, for lines
   std::string line_;       ///< of several parts
+  bool isBehindFirstLine_ = false;
   bool endsLine_ = true;
   std::string fault_;
 };

@@ -8,6 +8,7 @@
 #include <fmt/core.h>
 
 #include "common/calendar.h"
+#include "common/take_text.h"
 #include "common/text.h"
 #include "platform/series/csv_cells.h"
 #include "platform/series/missing_marker.h"
@@ -64,6 +65,12 @@ bool isHeadingOfHours(std::string_view heading) {
     if (c != ' ' && c != '_' && c != '-' && c != ':' && c != '.') letters += c;
   }
   return std::find(kHeadings.begin(), kHeadings.end(), toLowerAscii(letters)) != kHeadings.end();
+}
+
+bool isTimeOfDay(std::string_view cell) {
+  const auto hour = takeNumber(cell, 1, 2);
+  if (!hour || !takeText(cell, ":") || !takeNumber(cell, 2, 2)) return false;
+  return cell.empty() || cell.front() == ':';
 }
 
 bool areDates(std::int64_t startSecond, std::span<const double> days) {

@@ -37,6 +37,9 @@ class MissingMarks final {
 /// Whether a column with this heading seems to hold the time of day: "Hour", "HH:MM", "time (UTC)".
 bool isHeadingOfHours(std::string_view heading);
 
+/// Whether a cell holds a time of day: "9:30", "09:30:00".
+bool isTimeOfDay(std::string_view cell);
+
 /// Whether all times are at midnight.
 bool areDates(std::int64_t startSecond, std::span<const double> days);
 

@@ -59,6 +59,7 @@ void TextTable::clear() {
   names_.clear();
   timeColumns_.clear();
   itemColumns_.clear();
+  hourColumns_.clear();
   rows_.clear();
   items_.clear();
   times_.clear();
@@ -321,7 +322,12 @@ bool TextTable::readRow(const TextLayout::Line& line, TimeReading& times) {
     return fail(line.number, "a time later than " + formatDate(dateOfSecond(second_)),
                 formatDate(dateOfSecond(*second)));
   }
-  if (rows_.empty()) startSecond_ = *second;
+  if (rows_.empty()) {
+    startSecond_ = *second;
+    for (std::size_t i = 0; i < cells_.size(); ++i) {
+      if (isTimeOfDay(cells_[i])) hourColumns_.push_back(i);
+    }
+  }
   second_ = *second;
   times_.push_back(static_cast<double>(*second - startSecond_) / static_cast<double>(kSecondsOfDay));
   rows_.push_back({static_cast<std::size_t>(line.text.data() - content_.data()), line.number});
@@ -340,7 +346,8 @@ std::vector<std::string> TextTable::doubts() const {
   for (std::size_t place = 0; itemColumns_.size() > 1 && place < itemColumns_.size(); ++place) {
     const std::size_t column = itemColumns_[place];
     const bool isNextToTime = (column > 0 && isTimeColumn(column - 1)) || isTimeColumn(column + 1);
-    if (!isNextToTime || !isHeadingOfHours(names_[column]) || !areDates(startSecond_, times_)) continue;
+    const bool mayBeHours = isHeadingOfHours(names_[column]) || std::ranges::count(hourColumns_, column) > 0;
+    if (!isNextToTime || !mayBeHours || !areDates(startSecond_, times_)) continue;
     const std::string_view format = form_.timeFormat.empty() ? "" : ", with hh in Time_Format,";
     const std::string remedy =
         form_.timeUnit == TimeUnit::none

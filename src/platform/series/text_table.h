@@ -84,6 +84,7 @@ class TextTable final : public StoredTimeSeries {
   std::vector<std::string> names_;        ///< of all columns
   std::vector<std::size_t> timeColumns_;  ///< 0-based
   std::vector<std::size_t> itemColumns_;
+  std::vector<std::size_t> hourColumns_;  ///< that hold a time of day in the first row
   std::vector<Row> rows_;
   std::vector<TextLayout::Line> headers_;
   std::size_t blankLine_ = 0;    ///< number of the first one behind the last row; 0: none

@@ -11,6 +11,7 @@
 
 #include "common/files.h"
 #include "common/text.h"
+#include "common/utf8.h"
 #include "platform/series/csv_time_series.h"
 #include "platform/series/epanet_results.h"
 #include "platform/series/grdc_time_series.h"
@@ -172,7 +173,10 @@ std::unique_ptr<TimeSeriesObject> createTimeSeriesObject(const std::string& file
     if (!hasEnding(format, ending)) continue;
     // A file that cannot be read now is opened by the first format, which says why.
     if (found != nullptr && !head) head = readFileHead(std::string(trimTrailing(fileName)), reason).value_or("");
-    if (found == nullptr || format.fits(*head)) found = &format;
+    const bool hasMark = head && head->starts_with(kByteOrderMark);
+    if (found == nullptr || format.fits(std::string_view(*head).substr(hasMark ? kByteOrderMark.size() : 0))) {
+      found = &format;
+    }
   }
   reason.clear();
   if (found != nullptr) return found->make(std::move(reading));

@@ -6,6 +6,7 @@
 #include <unistd.h>
 
 #include "common/descriptor_output.h"
+#include "common/utf8.h"
 #include "platform/signals/signal_state.h"
 #include "platform/terminal/terminal.h"
 
@@ -29,7 +30,7 @@ MessageResult showMessage(std::string_view text, std::string_view title, Message
     shown.insert(0, colour);
     shown += "\x1b[0m";
   }
-  shown.append(": ").append(text).append("\n");
+  shown.append(": ").append(withValidUtf8(text)).append("\n");  // names and contents of files may be in any encoding
   if (signalState.liveLineDescriptor.exchange(-1) >= 0) shown.insert(0, kClearLine);
   return writeWhole(STDERR_FILENO, shown, kPatienceMilliseconds).error == 0 ? MessageResult::ok
                                                                             : MessageResult::notShown;

@@ -6,20 +6,24 @@ import { nameFilesAfter } from './figure_files';
 import { switchTheme } from './look';
 import { comparisonSection } from './sections/comparisons';
 import { historySection } from './sections/histories';
+import { morrisSection } from './sections/morris';
 import { failureSection, head, parameterSection, resultSection, runSection, summarySection } from './sections/overview';
 import { dottySection, goodSetsSection, progressSection } from './sections/search';
 import type { Section } from './sections/section';
 import { sensitivitySection } from './sections/sensitivity';
 import { seriesSection } from './sections/series';
+import { sobolSection } from './sections/sobol';
 import { bandSection, distributionSection } from './sections/uncertainty';
 import { validationSection } from './sections/validation';
 
 function sections(data: ReportData): Section[] {
   const { task } = data.run;
-  const sampled = task !== 'sensitivity'; // its evaluations vary one parameter at a time
+  const sampled = task !== 'sensitivity' || data.sobol; // a local analysis varies one parameter at a time
   const all = [
     bandSection(data),
     sensitivitySection(data),
+    morrisSection(data),
+    sobolSection(data),
     validationSection(data),
     seriesSection(data),
     parameterSection(data),

@@ -30,6 +30,7 @@ bool namesAFileOfResults(const ResultSetting& setting) {
   return setting.keyword == "BatchFileName" || setting.keyword == "TemplateFileName" ||
          setting.keyword == "Initial_Sample_File_Name" || setting.keyword == "Earlier_Result_File" ||
          setting.keyword == "Instruction_File" || setting.keyword == "Instruction_Times" ||
+         setting.keyword == "Values_File" || setting.keyword == "Correlation_File" ||
          (setting.keyword == "File_Name" && setting.section.ends_with("/OBSERVATION_FILE"));
 }
 

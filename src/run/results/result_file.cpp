@@ -111,7 +111,8 @@ std::optional<ResultRow> ResultFile::rowOf(int number) const {
 /// Runs in which no evaluation repeats another, as most over real parameters, have files without it.
 void ResultFile::addRepeatsColumn() {
   std::string reason;
-  const auto content = readAsWritten(reason);
+  const bool isThere = file_.tryAppend({}, reason);  // put back if it was removed, as before every row
+  const auto content = isThere ? readAsWritten(reason) : std::nullopt;
   if (!content) fatalError("Error: Unable to write to " + path(), reason);
   ResultColumns wider = columns_;
   wider.hasRepeats = true;

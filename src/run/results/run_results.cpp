@@ -1,6 +1,7 @@
 #include "run/results/run_results.h"
 
 #include <algorithm>
+#include <array>
 #include <filesystem>
 #include <set>
 #include <system_error>
@@ -41,6 +42,14 @@ std::vector<std::string> tableHeadLines(const RunConfig& config) {
 
 const ResultFileNames& namesOf(const RunConfig& config) {
   return config.task ? config.task->facts().resultFiles : run_files::kPlain;
+}
+
+/// The files of series that analyses write, a number each: bands, or Sobol' indices.
+std::span<const RunFile> seriesFilesOf(const ResultFileNames& names) {
+  static constexpr std::array kOfSensitivity{run_files::kSobolSeries};
+  static constexpr std::array kOfUncertainty{run_files::kBand, run_files::kTotalBand};
+  if (names.results == run_files::kSensitivity.results) return kOfSensitivity;
+  return kOfUncertainty;
 }
 
 }  // namespace
@@ -121,10 +130,11 @@ void RunResults::warnOfLostRows(RunLog& log) const {
                   files_.results, fileNameOf(files_.checksums), lost));
 }
 
-std::vector<std::string> RunResults::bandPaths(const RunConfig& config) const {
+std::vector<std::string> RunResults::seriesPaths(const RunConfig& config) const {
+  const TaskReport task = config.task->report();
+  const int count = task.hasBands || task.sobol != nullptr ? static_cast<int>(config.measures.size()) : 0;
   std::vector<std::string> paths;
-  const int count = config.task->report().hasBands ? static_cast<int>(config.measures.size()) : 0;
-  for (const RunFile& file : {run_files::kBand, run_files::kTotalBand}) {
+  for (const RunFile& file : seriesFilesOf(names_)) {
     for (int number = 1; number <= count; ++number) paths.push_back(runFilePath(filePrefix_, file, number));
   }
   return paths;
@@ -146,7 +156,7 @@ void RunResults::requireReplaceableFiles(const RunConfig& config) const {
   files.insert(files.end(), names_.tables.begin(), names_.tables.end());
   for (const RunFile& file : files) requireReplaceable(runFilePath(filePrefix_, file), file);
   requireReplaceable(pathBeside(filePrefix_, run_files::kFailedRuns), run_files::kFailedRuns);
-  for (const std::string& path : bandPaths(config)) requireReplaceable(path, run_files::kBand);
+  for (const std::string& path : seriesPaths(config)) requireReplaceable(path, seriesFilesOf(names_).front());
 }
 
 /// `calSimErr.dat` is one per folder, and runs of several setups may be going on in it.
@@ -169,26 +179,24 @@ void RunResults::close() {
 }
 
 void RunResults::writeTables(std::span<const DataTable> tables, RunLog& log) const {
-  for (const DataTable& found : tables) {
-    DataTable table = found;
-    table.headLines.insert(table.headLines.begin(), tableHead_.begin(), tableHead_.end());
+  for (const DataTable& table : tables) {
     const std::string path = runFilePath(filePrefix_, table.file);
-    const std::string text = dataTableText(table);
-    std::string reason;
-    if (readTextFile(path, reason) == text) continue;  // of a run that is walked through again
+    const auto content = [&] { return [parts = DataTableParts(table, tableHead_)]() mutable { return parts.next(); }; };
+    if (hasContent(path, content())) continue;  // of a run that is walked through again
     keepEarlierFile(path, log);
-    if (!replaceFile(path, text, reason)) fatalError("Error: Unable to write to " + path, reason);
+    std::string reason;
+    if (!replaceFile(path, content(), reason)) fatalError("Error: Unable to write to " + path, reason);
   }
 }
 
 /// Those of every measure that earlier runs had.
-std::vector<std::string> RunResults::earlierBands(RunLog& log) const {
+std::vector<std::string> RunResults::earlierSeries(RunLog& log) const {
   std::vector<std::string> paths;
-  for (const RunFile& file : {run_files::kBand, run_files::kTotalBand}) {
+  for (const RunFile& file : seriesFilesOf(names_)) {
     for (const auto& [path, digits] : numberedEntries(runFilePath(filePrefix_, file), file.extension)) {
       std::string reason;
       const auto head = readFileHead(path, reason);
-      if (!head) log.warning(fmt::format("{}: {}. It may be a band of an earlier run, and is not kept", path, reason));
+      if (!head) log.warning(fmt::format("{}: {}. It may be of an earlier run, and is not kept", path, reason));
       if (head && head->starts_with(file.mark)) paths.push_back(path);
     }
   }
@@ -201,8 +209,8 @@ void RunResults::keepEarlierFiles(const RunConfig& config, RunLog& log) const {
                                  files_.simulatedValues};
   for (std::string& path : pathsBesideResults()) paths.push_back(std::move(path));
   keepEarlierResults(paths, config.setupFile, log);
-  if (names_.results == run_files::kPlain.results) {
-    for (const std::string& path : earlierBands(log)) keepEarlierFile(path, log);
+  if (!(names_.results == run_files::kOptimisation.results)) {
+    for (const std::string& path : earlierSeries(log)) keepEarlierFile(path, log);
   }
   keepEarlierFile(runFilePath(filePrefix_, run_files::kSavedFolder), log);
   const std::string failedFolders = runFilePath(processFolderPrefix(config), run_files::kFailedFolder);
@@ -242,7 +250,7 @@ RunRecord RunResults::recordOf(const RunConfig& config, const RunLog& log) const
 void RunResults::removeStatistics(const RunConfig& config) const {
   std::error_code ignored;
   for (const RunFile& table : names_.tables) std::filesystem::remove(runFilePath(filePrefix_, table), ignored);
-  for (const std::string& path : bandPaths(config)) std::filesystem::remove(path, ignored);
+  for (const std::string& path : seriesPaths(config)) std::filesystem::remove(path, ignored);
 }
 
 /// Further runs must not be judged by another run than those before: the first successful one is repeated if its pairs

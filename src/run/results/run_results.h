@@ -77,8 +77,8 @@ class RunResults final {
   void keepEarlierFiles(const RunConfig& config, RunLog& log) const;
   /// Account, tables of failures, pairs and checksums, those of analyses.
   std::vector<std::string> pathsBesideResults() const;
-  std::vector<std::string> bandPaths(const RunConfig& config) const;
-  std::vector<std::string> earlierBands(RunLog& log) const;
+  std::vector<std::string> seriesPaths(const RunConfig& config) const;
+  std::vector<std::string> earlierSeries(RunLog& log) const;
   /// Those of an unfinished run do not count any more when it goes on, and can be computed again.
   void removeStatistics(const RunConfig& config) const;
   int restorePairs(const RunConfig& config, const ResultRows& rows, EarlierPairs& earlier, RunLog& log) const;

@@ -3,6 +3,8 @@
 #include <fmt/format.h>
 
 #include "algorithms/bayes/posterior.h"
+#include "common/calendar.h"
+#include "measures/dates.h"
 #include "run/tasks/analysis_names.h"
 #include "run/tasks/distribution_reading.h"
 #include "run/tasks/posterior_bands.h"
@@ -35,7 +37,22 @@ void DreamTask::read(const TaskReading& reading) {
   const SetupSection section = reading.target.open(kUncertaintySection);
   UncertaintySection filled{settings, randomSeed};
   section.read(uncertaintySection(), filled);
+  if (settings.bandEnd) {
+    const bool isSound = settings.bandTimes == BandTimes::steps && isValidDate(*settings.bandEnd) &&
+                         daysSince(reading.period.end, *settings.bandEnd) >= 0.0;
+    if (!isSound) {
+      section.refuse("Error: End date of the bands invalid", kBandEndKeyword,
+                     fmt::format("expected the end of the evaluation period, {}, or later, with {} = 'steps'",
+                                 formatDate(reading.period.end), kBandTimesKeyword));
+    }
+  }
   prior_ = readDistributions(reading, section);
+  if (const auto discrete = prior_.firstWithoutDensity()) {
+    section.refuse("Error: Prior of DREAM invalid", "Uncertainty_Type",
+                   fmt::format("the distribution of variable parameter {} has single values: expected one with a "
+                               "density, as chains move in small steps",
+                               *discrete + 1));
+  }
   readDreamSection(section, dream);
   dream.sampler.mostRuns = settings.sampleSize;
   constexpr std::int32_t kLeastGenerations = 10;

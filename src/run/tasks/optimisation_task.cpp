@@ -23,6 +23,7 @@ namespace {
 
 constexpr std::string_view kAlgorithmKeyword = "Algorithm_Type";
 constexpr std::string_view kSurrogateKeyword = "Use_Surrogate_Model";
+constexpr std::string_view kInvalidEarlierFile = "Error: Earlier result file invalid";
 
 /// Gives every set the value of a failed run.
 class NoModel final : public Evaluator {
@@ -136,7 +137,7 @@ void logBestSet(const TaskContext& context, const ParameterSet& best, const Eval
   context.log.line(fmt::format("Aggregate: {}", formatReal(result.aggregate)));
 }
 
-/// "Algorithm_Type = 'PSE', 'PDDS' or 'OPSE', or ..."
+/// "Algorithm_Type = 'PSE', 'PDDS', 'OPSE' or 'CMA-ES', or ..."
 std::string waysToRunSeveral() {
   std::string text = fmt::format("{} = {}", kAlgorithmKeyword, searchesWith(&SearchFacts::runsInParallel, "or", "'"));
   for (const auto& search : searchMethods().all()) {
@@ -198,6 +199,13 @@ void OptimisationTask::read(const TaskReading& reading) {
   sample.read(initialSampleSection(), filled);
   warnOfUnusedSample(sample);
   if (initialSample.generation == SampleGeneration::fromFile) {
+    if (!initialSample.earlierFile.empty()) {
+      sample.refuse(
+          kInvalidEarlierFile, kEarlierFileKeyword,
+          "expected this or Initial_Sample_Generation = 4, found both. Leave out the latter, and sets of this file "
+          "begin the sample, in which the others are drawn; or leave out this keyword, and all sets are those of "
+          "Initial_Sample_File_Name");
+    }
     validateFileOpens(initialSample.fileName, kInitialSampleFileKeyword, sample);
     if (method->facts().drawsInitialSample) takeGivenValues(reading, sample);
   } else if (!initialSample.fileName.empty()) {
@@ -275,14 +283,10 @@ void OptimisationTask::readEarlierResults(const TaskReading& reading, const Setu
     }
     return;
   }
-  constexpr std::string_view kInvalid = "Error: Earlier result file invalid";
-  if (initialSample.generation == SampleGeneration::fromFile) {
-    section.refuse(kInvalid, kEarlierFileKeyword, "expected this or Initial_Sample_Generation = 4, found both");
-  }
   validateFileOpens(file, kEarlierFileKeyword, section);
   std::error_code none;
   if (std::filesystem::equivalent(file, runFilePath(reading.filePrefix, facts().resultFiles.results), none)) {
-    section.refuse(kInvalid, kEarlierFileKeyword,
+    section.refuse(kInvalidEarlierFile, kEarlierFileKeyword,
                    "expected another file than the one that this run writes: copy it, with the one ending in "
                    "_Restart.dat, under another name");
   }
@@ -305,7 +309,7 @@ void OptimisationTask::readEarlierResults(const TaskReading& reading, const Setu
   auto sets =
       readEarlierSets(file, text, settings, initialSample.earlierOrder, static_cast<std::size_t>(std::min(most, room)),
                       space, hasInitial ? std::optional(space.initial) : std::nullopt, reason);
-  if (!sets) section.refuse(kInvalid, kEarlierFileKeyword, reason);
+  if (!sets) section.refuse(kInvalidEarlierFile, kEarlierFileKeyword, reason);
   if (sets->outsideCount > 0) {
     section.warn(kEarlierFileKeyword,
                  fmt::format("{} left out, as values lie outside the bounds; the first: {}",
@@ -326,6 +330,7 @@ void OptimisationTask::readMethod(const TaskReading& reading, const SetupSection
   const BoundSection bound = method->section();
   const SetupSection control = section.open(nameInside(*bound.row));
   control.read(bound);
+  method->setVariableCount(reading.variableCount);
   // A population or simplex that is too small spans too few directions and converges early, away from the optimum.
   for (const SearchAdvice& advice : method->advice(reading.variableCount)) {
     if (advice.found >= advice.advised) continue;
@@ -484,6 +489,7 @@ TaskOutcome OptimisationTask::run(const TaskContext& context) {
 
   const SearchSummary summary = search(context);
   context.log.line("");
+  for (const std::string& note : summary.notes) context.log.line(note);
   context.log.line(summary.terminationMessage);
   if (summary.replacedCount > 0) {
     context.log.line(fmt::format(

@@ -11,12 +11,14 @@
 #include "algorithms/analyses/covariance.h"
 #include "algorithms/numbers/lapack_functions.h"
 #include "common/calendar.h"
+#include "common/text.h"
 #include "evaluation/stored_results.h"
 #include "measures/dates.h"
 #include "measures/period_series.h"
 #include "measures/statistics.h"
 #include "parameters/parameter_model.h"
 #include "run/tasks/analysis_names.h"
+#include "run/tasks/distribution_reading.h"
 #include "run/tasks/infeasible_sets.h"
 #include "run/tasks/sensitivity_section.h"
 
@@ -132,10 +134,12 @@ struct Linearised {
   std::string problem;
 };
 
-Linearised linearised(const TaskContext& context, const LocalSensitivity& sensitivity) {
+/// Takes the simulated values, which nothing else needs.
+Linearised linearised(const TaskContext& context, LocalSensitivity& sensitivity) {
   Linearised result;
   if (sensitivity.results.front().ok()) {
     ComparedValues compared = compareSeries(context, sensitivity.results);
+    for (EvaluationResult& each : sensitivity.results) each.simulatedValues = std::vector<double>();
     if (compared.observed.empty()) {
       result.problem = "no objective function compares time series";
       return result;
@@ -155,9 +159,23 @@ Linearised linearised(const TaskContext& context, const LocalSensitivity& sensit
   return result;
 }
 
+/// Says how many observations are single numbers, which have no simulated series and so no rows in the covariance.
+std::optional<std::string> numbersLeftOut(const TaskContext& context) {
+  std::size_t count = 0;
+  for (std::size_t i = 0; i < context.measures.size(); ++i) {
+    const OutputMeasure& measure = context.measures[i];
+    const bool isNumber = measure.interfaceType == InterfaceType::measureFile && measure.observedValue.has_value();
+    if (isNumber && hasWeight(measure) && isInObjective(context, i)) ++count;
+  }
+  if (count == 0) return std::nullopt;
+  return fmt::format("The covariance is of time series alone: {} with Observed_Value {} not in it",
+                     countText(count, "output measure"), count == 1 ? "is" : "are");
+}
+
 /// Adds the covariance analysis to the outcome.
-void addCovariance(const TaskContext& context, const ParameterSet& set, const Linearised& found, TaskOutcome& outcome) {
+void addCovariance(const TaskContext& context, const ParameterSet& set, Linearised found, TaskOutcome& outcome) {
   outcome.report.emplace_back();
+  if (auto text = numbersLeftOut(context)) outcome.report.push_back(*std::move(text));
   if (!found.model) {
     outcome.report.push_back("Warning: No covariance matrix: " + found.problem);
     return;
@@ -167,7 +185,7 @@ void addCovariance(const TaskContext& context, const ParameterSet& set, const Li
     outcome.report.push_back(std::move(line));
   }
   for (DataTable& table : covarianceTables(covariance, context.space, set)) outcome.tables.push_back(std::move(table));
-  outcome.tables.push_back(jacobianTable(*found.model, context.space, found.labels));
+  outcome.tables.push_back(jacobianTable(*std::move(found.model), context.space, found.labels));
 }
 
 /// The aggregates of 64 bits: what rounding leaves of a change by a small step is not taken for a better fit.
@@ -187,7 +205,9 @@ const TaskFacts& SensitivityTask::facts() const {
 }
 
 std::vector<const SectionRow*> SensitivityTask::sections() const {
-  return {&sensitivitySection().row, &localSensitivitySection().row};
+  std::vector<const SectionRow*> rows{&sensitivitySection().row, &localSensitivitySection().row};
+  for (const SectionRow* row : distributionSections(kSensitivitySection)) rows.push_back(row);
+  return rows;
 }
 
 std::vector<std::string> SensitivityTask::neededSections(const SetupSection& /*target*/) const {
@@ -224,7 +244,7 @@ TaskOutcome SensitivityTask::outcomeOf(const TaskContext& context, Evaluator& ev
   const AnalysisNames names = analysisNames(context);
   outcome.report = formatSensitivity(sensitivity, names);
   outcome.tables = sensitivityTables(sensitivity, names);
-  if (settings.calculatesCovariance) addCovariance(context, sensitivity.plan.sets.front(), found, outcome);
+  if (settings.calculatesCovariance) addCovariance(context, sensitivity.plan.sets.front(), std::move(found), outcome);
   return outcome;
 }
 

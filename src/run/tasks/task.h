@@ -29,6 +29,7 @@
 namespace mirevo {
 
 struct SensitivitySettings;
+struct SobolSettings;
 
 /// A form of a task and the keyword that selects it.
 struct TaskForm {
@@ -112,6 +113,8 @@ struct TaskReport {
   int populationSize = 0;                            ///< 0: none
   bool hasBands = false;                             ///< it writes bands of simulated series
   const SensitivitySettings* sensitivity = nullptr;  ///< for a local sensitivity analysis, else null
+  bool hasMorris = false;                            ///< it writes the table of a Morris screening
+  const SobolSettings* sobol = nullptr;              ///< for Sobol' indices, else null
   std::vector<std::string> runNames = {};  ///< of the evaluations, from the first on; empty where one has none
 };
 

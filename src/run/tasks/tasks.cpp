@@ -1,9 +1,11 @@
 #include "run/tasks/tasks.h"
 
 #include "run/tasks/dream_task.h"
+#include "run/tasks/morris_task.h"
 #include "run/tasks/optimisation_task.h"
 #include "run/tasks/scenario_task.h"
 #include "run/tasks/sensitivity_task.h"
+#include "run/tasks/sobol_task.h"
 #include "run/tasks/uncertainty_task.h"
 
 namespace mirevo {
@@ -26,7 +28,7 @@ const ChoiceTable<Task>& tasks() {
 
 std::vector<std::unique_ptr<Task>> furtherTaskForms() {
   /// A new form of a task is added here, and its name to the codes of the keyword that selects it.
-  return oneOfEach<DreamTask>();
+  return oneOfEach<MorrisTask, SobolTask, DreamTask>();
 }
 
 std::unique_ptr<Task> selectedForm(const Task& task, const SetupSection& target) {

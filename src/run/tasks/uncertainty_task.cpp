@@ -3,8 +3,6 @@
 #include <algorithm>
 #include <cmath>
 #include <cstdint>
-#include <filesystem>
-#include <system_error>
 
 #include <fmt/format.h>
 
@@ -16,7 +14,9 @@
 #include "common/text.h"
 #include "measures/dates.h"
 #include "run/tasks/analysis_names.h"
+#include "run/tasks/distribution_reading.h"
 #include "run/tasks/infeasible_sets.h"
+#include "run/tasks/simulated_room.h"
 
 namespace mirevo {
 namespace {
@@ -53,10 +53,6 @@ std::optional<SettingRefusal> validateBandEnd(const UncertaintySettings& setting
   return SettingRefusal{kRefusal, kBandEndKeyword,
                         fmt::format("expected the end of the evaluation period, {}, or later, found {}",
                                     formatDate(period.end), formatDate(*settings.bandEnd))};
-}
-
-std::string sizeText(std::uintmax_t bytes) {
-  return fmt::format("{:.1f} MB", static_cast<double>(bytes) / 1e6);
 }
 
 /// Adds the band of each series to `files` and returns one line on each for the report.
@@ -105,7 +101,9 @@ const TaskFacts& UncertaintyTask::facts() const {
 }
 
 std::vector<const SectionRow*> UncertaintyTask::sections() const {
-  return {&uncertaintySection().row, &distributionSection().row};
+  std::vector<const SectionRow*> rows{&uncertaintySection().row};
+  for (const SectionRow* row : distributionSections(kUncertaintySection)) rows.push_back(row);
+  return rows;
 }
 
 std::vector<std::string> UncertaintyTask::neededSections(const SetupSection& target) const {
@@ -130,17 +128,18 @@ void UncertaintyTask::read(const TaskReading& reading) {
     section.refuse(kSampleSizeRefusal, kSampleSizeKeyword, fmt::format("{}, found {}", *tooMany, settings.sampleSize));
   }
   section.require(validateBandEnd(settings, reading.period));
-  if (const auto surplus = section.itemBeyond("PARAMETER_", reading.variableCount)) {
-    surplus->warn(surplus->name(),
-                  fmt::format("not read: PARAMETER_n is the distribution of the n-th of the {} variable parameters. "
-                              "If the sections are numbered by model parameter, each one that comes after a fixed or "
-                              "dependent parameter is taken for another parameter's",
-                              reading.variableCount));
+  settings.distributions = readDistributions(reading, section, MissingDistribution::isRefused);
+  std::size_t variable = 0;
+  for (const ModelParameter& parameter : reading.parameters) {
+    std::vector<double>& values = singleValues_.emplace_back();
+    if (parameter.parameterType != ParameterType::variable) continue;
+    const std::span<const double> ofParameter = settings.distributions[variable++].singleValues();
+    values.assign(ofParameter.begin(), ofParameter.end());
   }
-  for (std::size_t i = 0; i < reading.variableCount; ++i) {
-    const SetupSection item = section.openItem("PARAMETER_", i + 1);
-    item.read(distributionSection(), settings.parameters.emplace_back());
-  }
+}
+
+std::vector<double> UncertaintyTask::givenValues(std::size_t parameter) const {
+  return parameter < singleValues_.size() ? singleValues_[parameter] : std::vector<double>{};
 }
 
 std::optional<KeptSteps> UncertaintyTask::keptSteps() const {
@@ -154,21 +153,21 @@ std::string UncertaintyTask::description() const {
 }
 
 std::vector<std::string> UncertaintyTask::summaryLines(const SearchSpace& space) const {
-  return distributionLines(settings, space);
+  return distributionLines(settings.distributions, space);
 }
 
 std::vector<std::string> UncertaintyTask::warnings(const SearchSpace& space) const {
-  return distributionWarnings(settings, space);
+  return distributionWarnings(settings.distributions, space);
 }
 
 void UncertaintyTask::requireSets(const SearchSpace& /*space*/, const Feasibility& feasibility) const {
-  if (!settings.redrawsInfeasible || !feasibility.isTested() || settings.parameters.empty()) return;
-  feasibleUncertaintySample(settings, randomSeed, feasibility, [](std::string_view) {});
+  if (!settings.redrawsInfeasible || !feasibility.isTested() || settings.distributions.size() == 0) return;
+  feasibleUncertaintySample(settings, randomSeed, feasibility);
 }
 
 /// `acceptance`: a line on the sets drawn, if any can be drawn again.
 std::vector<ParameterSet> UncertaintyTask::drawSample(const TaskContext& context, std::string& acceptance) const {
-  if (settings.parameters.empty()) return {};
+  if (settings.distributions.size() == 0) return {};
   const auto messages = [&](std::string_view text) { context.log.line(text); };
   if (!settings.redrawsInfeasible) {
     std::vector<ParameterSet> sample = uncertaintySample(settings, randomSeed, messages);
@@ -226,37 +225,12 @@ void UncertaintyTask::logBandTimes(const TaskContext& context) const {
   }
 }
 
-/// Where the simulated values take much room, or more than there is.
-void UncertaintyTask::logRoom(const TaskContext& context) const {
-  constexpr std::uintmax_t kMuch = 100'000'000;
-  const std::string path = runFilePath(context.filePrefix, run_files::kPlain.simulatedValues);
-  const std::uintmax_t bytes = static_cast<std::uintmax_t>(settings.sampleSize) * sizeof(double) *
-                               simulatedValueCount(context.observedSeries, SeriesPrecision::single);
-  std::error_code failed;
-  const std::uintmax_t size = std::filesystem::file_size(path, failed);
-  const std::uintmax_t written = failed ? 0 : std::min(size, bytes);
-  const std::filesystem::space_info disk = std::filesystem::space(std::filesystem::path(path).parent_path(), failed);
-  const bool isShort = !failed && bytes - written > disk.available;
-  if (bytes < kMuch && !isShort) return;
-  std::string text = fmt::format("The simulated values of {} sets take {} in {}", settings.sampleSize, sizeText(bytes),
-                                 fileNameOf(path));
-  if (written > 1'000'000) text += fmt::format(", which has {} of them", sizeText(written));
-  if (!failed) text += fmt::format("; its disk has {}{} free", isShort ? "only " : "", sizeText(disk.available));
-  if (isShort && context.warnUser) {
-    context.warnUser(text);
-  } else if (isShort) {
-    context.log.warning(text);
-  } else {
-    context.log.line(text);
-  }
-}
-
 TaskOutcome UncertaintyTask::run(const TaskContext& context) {
   std::string acceptance;
   std::vector<ParameterSet> sample = drawSample(context, acceptance);
   context.log.line(setsOutsideBounds(sample, context.space));
   logBandTimes(context);
-  logRoom(context);
+  logRoomOfSimulatedValues(context, run_files::kPlain.simulatedValues, sample.size());
   const UncertaintyOutcome found = uncertaintyAnalysis(std::move(sample), context.evaluator);
   TaskOutcome outcome = outcomeOf(context, found);
   if (!acceptance.empty()) outcome.report.insert(outcome.report.begin() + 1, acceptance);

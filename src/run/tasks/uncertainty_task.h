@@ -12,6 +12,7 @@ class UncertaintyTask final : public Task {
   std::vector<const SectionRow*> sections() const override;
   std::vector<std::string> neededSections(const SetupSection& target) const override;
   void read(const TaskReading& reading) override;
+  std::vector<double> givenValues(std::size_t parameter) const override;
   std::string description() const override;
   std::vector<std::string> summaryLines(const SearchSpace& space) const override;
   std::vector<std::string> warnings(const SearchSpace& space) const override;
@@ -30,8 +31,9 @@ class UncertaintyTask final : public Task {
  private:
   TaskOutcome outcomeOf(const TaskContext& context, const UncertaintyOutcome& found) const;
   void logBandTimes(const TaskContext& context) const;
-  void logRoom(const TaskContext& context) const;
   std::vector<ParameterSet> drawSample(const TaskContext& context, std::string& acceptance) const;
+
+  std::vector<std::vector<double>> singleValues_;  ///< of discrete distributions, by parameter
 };
 
 }  // namespace mirevo

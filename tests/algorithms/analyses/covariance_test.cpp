@@ -179,6 +179,17 @@ TEST(ParameterCovariance, SaysWhatTheCorrelationOfTheResidualsDoesToIt) {
   EXPECT_EQ(covarianceTables(perfect, spaceOf({1}), std::vector<double>{1}).back().headLines.size(), 1U);
 }
 
+TEST(ParameterCovariance, ItsJacobianHasTheRowsThatCount) {
+  const LinearisedModel model{{0.5, NAN, -1}, {1, 4, 0.25}, {{1, 2, 3}, {4, 5, NAN}}};
+  const ObservationLabel labels[] = {{"flow", "2001-01-01"}, {"flow", "2001-01-02"}, {"head", "2001-01-03"}};
+  SearchSpace space = spaceOf({1, 2});
+  space.names = {"a", "b"};
+  const std::string text = dataTableText(jacobianTable(model, space, labels));
+  EXPECT_EQ(text.substr(text.find('\n') + 1),
+            "Measure\tTime\tWeight\tResidual\ta\tb\nflow\t2001-01-01\t1\t0.5\t1\t4\n"
+            "head\t2001-01-03\t0.25\t-1\t3\tNaN\n");
+}
+
 TEST(ParameterCovariance, SaysWhenThereIsLittleOrNothingToEstimateItFrom) {
   const SearchSpace space = spaceOf({1, 2});
   const ParameterCovariance exact = parameterCovariance({{0.1, 0.2}, {}, {{1, 1}, {0, 1}}});

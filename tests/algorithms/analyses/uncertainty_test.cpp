@@ -16,17 +16,20 @@
 namespace mirevo {
 namespace {
 
-double normalProbability(double z) {
-  return 0.5 * std::erfc(-z / std::sqrt(2.0));
+/// Independent normal distributions: means and standard deviations.
+ParameterDistributions normals(const std::vector<std::pair<double, double>>& parameters) {
+  std::vector<DistributionPointer> made;
+  for (const auto& [mean, deviation] : parameters) made.push_back(normalDistribution(mean, deviation));
+  return ParameterDistributions(std::move(made));
 }
 
 TEST(UncertaintySample, DrawsColumnByColumnFromTheSeed) {
-  const UncertaintySettings settings{SamplingType::simpleRandom, 3, {{10.0, 2.0}, {-1.0, 0.5}}};
+  const UncertaintySettings settings{SamplingType::simpleRandom, 3, normals({{10.0, 2.0}, {-1.0, 0.5}})};
   const std::vector<ParameterSet> sample = uncertaintySample(settings, 5);
   UniformGenerator random(5);
   for (std::size_t j = 0; j < 2; ++j) {
     for (std::size_t i = 0; i < 3; ++i) {
-      const double z = (sample[i][j] - settings.parameters[j].mean) / settings.parameters[j].standardDeviation;
+      const double z = (sample[i][j] - (j == 0 ? 10.0 : -1.0)) / (j == 0 ? 2.0 : 0.5);
       EXPECT_NEAR(normalProbability(z), random.next(), 1e-14);
     }
   }
@@ -35,7 +38,7 @@ TEST(UncertaintySample, DrawsColumnByColumnFromTheSeed) {
 
 TEST(UncertaintySample, LatinHypercubeHitsEachStratumOnceInRankOrder) {
   for (const int n : {4, 1000}) {
-    const UncertaintySettings settings{SamplingType::latinHypercube, n, {{0.0, 1.0}, {0.0, 1.0}, {3.0, 0.0}}};
+    const UncertaintySettings settings{SamplingType::latinHypercube, n, normals({{0.0, 1.0}, {0.0, 1.0}, {3.0, 0.0}})};
     const std::vector<ParameterSet> sample = uncertaintySample(settings, 17);
     for (std::size_t j = 0; j < 2; ++j) {
       std::set<int> strata;
@@ -46,7 +49,8 @@ TEST(UncertaintySample, LatinHypercubeHitsEachStratumOnceInRankOrder) {
       EXPECT_LT(std::abs(correlationMatrix(sample)[0][1]), 0.1);
     }
     // The permutation ranks the deviates that simple random sampling would use.
-    const std::vector<ParameterSet> simple = uncertaintySample({SamplingType::simpleRandom, n, {{0.0, 1.0}}}, 17);
+    const std::vector<ParameterSet> simple =
+        uncertaintySample({SamplingType::simpleRandom, n, normals({{0.0, 1.0}})}, 17);
     for (std::size_t i = 1; i < sample.size(); ++i) {
       EXPECT_EQ(sample[i][0] < sample[0][0], simple[i][0] < simple[0][0]) << i;
       EXPECT_EQ(sample[i][2], 3.0);
@@ -59,7 +63,7 @@ TEST(UncertaintySample, DrawsOnlySetsThatCannotBeRunAgain) {
     return feasibleWhere([limit](const auto& set) { return set[0] > limit; }, "too small");
   };
   for (const SamplingType type : {SamplingType::simpleRandom, SamplingType::latinHypercube}) {
-    const UncertaintySettings settings{type, 200, {{0.0, 1.0}, {3.0, 2.0}}};
+    const UncertaintySettings settings{type, 200, normals({{0.0, 1.0}, {3.0, 2.0}})};
     const std::vector<ParameterSet> drawn = uncertaintySample(settings, 5);
     const FeasibleSample sample = feasibleUncertaintySample(settings, 5, above(0.0));
     ASSERT_EQ(sample.sets.size(), 200U);
@@ -88,7 +92,7 @@ TEST(UncertaintyAnalysis, EvaluatesOneBatchAndLeavesFailuresOut) {
     return result;
   });
   const UncertaintyOutcome outcome =
-      uncertaintyAnalysis(uncertaintySample({SamplingType::simpleRandom, 5, {{1.0, 0.0}}}, 1), evaluator);
+      uncertaintyAnalysis(uncertaintySample({SamplingType::simpleRandom, 5, normals({{1.0, 0.0}})}, 1), evaluator);
   ASSERT_EQ(evaluator.batches.size(), 1U);
   EXPECT_EQ(evaluator.batches[0].size(), 5U);
   const SearchSpace space{.names = {"K"}, .lower = {0.0}, .upper = {5.0}, .transformation = {TransformationType::none}};
@@ -138,17 +142,17 @@ TEST(DistributionWarnings, AreOfMeansOutsideTheBoundsAndOfMostValuesThere) {
       {7, "Mean_Value of PARAMETER_2 (n) is 7: outside the bounds 0 to 6"},
       {-0.5, "Mean_Value of PARAMETER_2 (n) is -0.5: outside the bounds 0 to 6"}};
   for (const auto& [mean, warning] : ofIntegers) {
-    const UncertaintySettings settings{SamplingType::simpleRandom, 5, {{0.0, 1.0}, {mean, 0.6}}};
-    const std::vector<std::string> found = distributionWarnings(settings, space);
+    const ParameterDistributions distributions = normals({{0.0, 1.0}, {mean, 0.6}});
+    const std::vector<std::string> found = distributionWarnings(distributions, space);
     EXPECT_EQ(found, warning == nullptr ? std::vector<std::string>{} : std::vector<std::string>{warning}) << mean;
   }
   // Values from -1 to 7 become 0 to 6: the normal distribution has 0.3829 within half a standard deviation.
-  EXPECT_THAT(distributionWarnings({SamplingType::simpleRandom, 5, {{0.0, 1.0}, {3.0, 8.0}}}, space),
+  EXPECT_THAT(distributionWarnings(normals({{0.0, 1.0}, {3.0, 8.0}}), space),
               ElementsAre("Standard_Deviation of PARAMETER_2 (n) is 8: about 62 % of the values drawn are outside the "
                           "bounds 0 to 6"));
-  const UncertaintySettings settings{SamplingType::simpleRandom, 5, {{3.0, 1.0}, {2.0, 0.6}}};
+  const ParameterDistributions distributions = normals({{3.0, 1.0}, {2.0, 0.6}});
   EXPECT_THAT(
-      distributionWarnings(settings, space),
+      distributionWarnings(distributions, space),
       ElementsAre("Mean_Value of PARAMETER_1 (a) is 3, on the model scale 20.0855: outside the bounds 0.5 to 4; "
                   "the mean of a logarithmic parameter is that of its natural logarithm, ln(3) = 1.09861"));
 }

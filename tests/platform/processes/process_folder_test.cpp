@@ -360,5 +360,27 @@ TEST(ProcessFolder, LinksReadOnlyFilesOnRequest) {
   EXPECT_FALSE(fs::equivalent(folder / "base/forcing.bin", folder / "run_Failed1/forcing.bin"));
 }
 
+TEST(ProcessFolder, KeepsOneCopyOfReadOnlyFilesOnAnotherDisk) {
+  const TemporaryFolder folder;
+  folder.write("base/forcing.bin", "large", 0444);
+  std::string other = "/dev/shm/mirevo_test_XXXXXX";
+  if (::mkdtemp(other.data()) == nullptr || statusOf(other).st_dev == statusOf(folder.path()).st_dev) {
+    fs::remove(other);
+    GTEST_SKIP() << "no other disk";
+  }
+  const std::vector<std::string> targets{other + "/run_Process1"};
+  std::vector<std::uint64_t> kept;
+  for (int run = 0; run < 3; ++run) {
+    kept.push_back(makeProcessFolders(listFolder(folder / "base", folder / "run_Process"), targets, {{}, true},
+                                      [](const FoldersMade&) {})
+                       .keptFiles);
+    if (run == 1) folder.write("base/forcing.bin", "other", 0644);
+    if (run == 1) fs::permissions(folder / "base/forcing.bin", fs::perms::owner_read);
+  }
+  EXPECT_THAT(kept, ElementsAre(0U, 1U, 0U));
+  EXPECT_EQ(TemporaryFolder::readFile(targets[0] + "/forcing.bin"), "other");
+  fs::remove_all(other);
+}
+
 }  // namespace
 }  // namespace mirevo

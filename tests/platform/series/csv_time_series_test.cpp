@@ -156,9 +156,13 @@ TEST(CsvTimeSeries, AFirstItemThatIsCalledLikeATimeOfDayIsDoubted) {
     ASSERT_TRUE(series.parse("s.csv", fmt::format("date,{},Q\n2001-01-01,12,1\n2001-01-02,12,1\n", heading)));
     EXPECT_THAT(series.doubts(), ElementsAre(HasSubstr(" and is read as item No. 1, not as a part of the time; ")));
   }
+  // Whatever its heading, if it holds one.
+  ASSERT_TRUE(series.parse("s.csv", "Datum;Uhr;Q\n2001-01-01;09:30;1\n2001-01-02;09:30;1\n"));
+  EXPECT_THAT(series.doubts(), ElementsAre(HasSubstr("column 2 is called \"Uhr\" and is read as item No. 1, not as")));
   for (const char* content :
-       {"date,hourly,Q\n2001-01-01,12,1\n", "date,hour\n2001-01-01,12\n", "date,Q,hour\n2001-01-01,1,12\n",
-        "date,hour,Q\n2001-01-01 06:00,12,1\n", "date,hour,Q\n2001-01-01,12,1\n2001-01-01 06:00,12,1\n"}) {
+       {"date,Q,peak\n2001-01-01,1,9:30\n", "date,hourly,Q\n2001-01-01,12,1\n", "date,hour\n2001-01-01,12\n",
+        "date,Q,hour\n2001-01-01,1,12\n", "date,hour,Q\n2001-01-01 06:00,12,1\n",
+        "date,hour,Q\n2001-01-01,12,1\n2001-01-01 06:00,12,1\n"}) {
     ASSERT_TRUE(series.parse("s.csv", content));
     EXPECT_THAT(series.doubts(), IsEmpty()) << content;
   }

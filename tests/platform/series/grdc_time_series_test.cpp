@@ -33,6 +33,12 @@ TEST(GrdcTimeSeries, ReadsDaysAndMonths) {
   EXPECT_THAT(timesOf(*series), ElementsAre(0.0, 1.0, 3.5));
   EXPECT_THAT(valuesOf(*series, 1), ElementsAre(123.0F, -999999.0F, 0.5F));
 
+  const std::string marked =
+      folder.write("marked_Q_Day.Cmd.txt", "\xEF\xBB\xBF" + folder.read("6335020_Q_Day.Cmd.txt"));
+  series = createTimeSeriesObject(marked, reason);
+  ASSERT_TRUE(series->open(marked)) << series->lastError();
+  EXPECT_THAT(valuesOf(*series, 1), ElementsAre(123.0F, -999999.0F, 0.5F));
+
   const std::string months = folder.write("6335020.mon", head(2, " Original; Calculated; Flag") +
                                                              "1951-01-00;--:--;  2.030;   -999.000;   0\r\n"
                                                              "1951-02-01;--:--;  1.680;      1.700; 100\r\n");

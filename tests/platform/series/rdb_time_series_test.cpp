@@ -95,8 +95,11 @@ TEST(RdbTimeSeries, RefusesWithThePlaceAndWhatWasExpected) {
 TEST(RdbTimeSeries, IsToldFromATableByItsRowOfFormats) {
   const TemporaryFolder folder;
   std::string reason;
-  const std::tuple<std::string, std::string, int> cases[] = {{"usgs.txt", kHead + "USGS\t1\t2012-09-30\t191\tA\n", 2},
-                                                             {"table.txt", "time\tQ\tH\tT\n2012-09-30\t1\t2\t3\n", 3}};
+  const std::tuple<std::string, std::string, int> cases[] = {
+      {"usgs.txt", kHead + "USGS\t1\t2012-09-30\t191\tA\n", 2},
+      {"mark.txt", "\xEF\xBB\xBF" + kHead, 2},
+      {"noted.rdb", "\xEF\xBB\xBF" + kHead.substr(kHead.find("agency")), 2},
+      {"table.txt", "time\tQ\tH\tT\n2012-09-30\t1\t2\t3\n", 3}};
   for (const auto& [name, content, items] : cases) {
     const auto series = createTimeSeriesObject(folder.write(name, content), reason);
     ASSERT_TRUE(series->open(folder / name)) << series->lastError();

@@ -229,6 +229,12 @@ TEST(TextTable, DoubtsWhatSeemsToBeMeantInAnotherWay) {
        "Q,hh:mm,date\n1,12:00,01.01.2000\n",
        {": column 2 is called \"hh:mm\" and is read as item No. 2, not as a part of the time; Time_Column = 'date, 2', "
         "with hh in Time_Format, takes it as one"}},
+      {usual,
+       "date,Uhr,Q\n2000-01-01,9:30,1\n",
+       {": column 2 is called \"Uhr\" and is read as item No. 1, not as a part of the time; Time_Column = '1, 2' "
+        "takes "
+        "it as one"}},
+      {usual, "date,Q,peak at\n2000-01-01,1,9:30\n", {}},
       {usual, "date,hours\n2000-01-01,12\n", {}},
       {usual, "date,hours,Q\n2000-01-01 06:00,12,1\n", {}},
       {{.timeColumn = "1,2"}, "date,hour,Q\n2000-01-01,12:00,1\n", {}},

@@ -51,6 +51,8 @@ const cases = {
     kOptimisation.filter((id) => id !== 'failures')],
   'an uncertainty analysis': [sample.dataOf('uncertainty'), 1 + 3 + 1 + 5 + 2, ['band', 'series', 'parameters', 'results', 'compared', 'progress', 'distributions', 'dotty', 'failures', 'run', 'summary']],
   'a sensitivity analysis': [sample.dataOf('sensitivity'), 4 + 3, ['sensitivity', 'series', 'parameters', 'results', 'compared', 'run', 'summary']],
+  'Sobol indices': [sample.dataOf('sobol'), 4 + 4 + 2, ['sobol', 'series', 'parameters', 'results', 'compared', 'progress', 'dotty', 'run', 'summary']],
+  'Sobol indices with hostile names': [sample.hostile(sample.dataOf('sobol')), 10, null, true],
   'scenario runs': [sample.dataOf('scenarios'), 4 + 1 + 2, ['series', 'parameters', 'results', 'compared', 'progress', 'dotty', 'run', 'summary']],
   'a run without an evaluation': [sample.empty(), 0, ['run']],
   'a run whose evaluations all failed': [sample.dataOf('allFailed'), 0, ['parameters', 'results', 'failures', 'run', 'summary']],

@@ -101,6 +101,15 @@ export function hostile(data) {
     data.sensitivity.covariance.names = data.sensitivity.covariance.names.map(rename);
     data.sensitivity.covariance.leftOut = [{ name: kHostile[0], reason: kHostile[1] }];
   }
+  if (data.sobol) {
+    data.sobol.factors = data.sobol.factors.map(rename);
+    for (const output of data.sobol.outputs) output.name = rename(output.name);
+    for (const series of data.sobol.series) {
+      Object.assign(series, { measure: rename(series.measure), unit: kHostile[1] });
+      series.total[0].fill(null, 90, 95);
+    }
+    data.sobol.outputs.at(-1).first[0] = [null, null, null, 0];
+  }
   Object.assign(data.run, { title: kHostile[0] + kHostile[4], taskName: kHostile[1], message: kHostile[5], notes: [...kHostile] });
   data.failures = kHostile.map((text) => ({ reason: text, count: 1, example: text }));
   data.summary = [...kHostile];

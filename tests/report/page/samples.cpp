@@ -10,12 +10,18 @@ int main(int argc, char** argv) {
       {"short", {.maxEvaluations = 12}},
       {"uncertainty", {.option = 3, .maxEvaluations = 60, .modelArguments = "--fail-above 6"}},
       {"sensitivity", {.option = 1}},
+      {"sobol", {.option = 1}},
       {"scenarios", {.option = 0, .scenarios = scenarios(30)}},
       {"allFailed", {.option = 0, .scenarios = scenarios(30), .modelArguments = "--fail-above -1"}}};
   if (argc != 2) return 2;
   for (const auto& [name, settings] : samples) {
     const ModelFolder folder;
-    runProgram({folder.writeSetup(settings)});
+    const std::string setup = folder.writeSetup(settings);
+    if (name == "sobol") {
+      folder.editSetup("Sensitivity_Type = 0",
+                       "Sensitivity_Type = 'Sobol'\n[SOBOL]\nSample_Size = 64\nSecond_Order = 1\n[/SOBOL]");
+    }
+    runProgram({setup});
     std::filesystem::copy_file(folder / "basin_Report.html", std::string(argv[1]) + "/" + name);
   }
   return 0;

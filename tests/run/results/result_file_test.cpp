@@ -153,6 +153,18 @@ TEST_F(ResultFileTest, TheFirstRowThatRepeatsAnotherBringsItsColumn) {
   EXPECT_EQ(checksums(), 5U);
 }
 
+TEST_F(ResultFileTest, AFileThatWasRemovedIsPutBackBeforeItGetsTheColumnOfRepeats) {
+  open();
+  add(success(1, 1, 1), 1);
+  std::filesystem::remove(path_);
+  ResultRow repeat = resultRow(std::vector<double>{1}, success(2, 1, 1));
+  repeat.repeats = 1;
+  results_.addRow(repeat);
+  ASSERT_TRUE(results_.finish({}, reason_)) << reason_;
+  EXPECT_THAT(folder_.read("r.dat"), testing::EndsWith("\tRepeats\n1\tOK\t1\t1\t1\t1\t0\n2\tOK\t1\t1\t1\t1\t1\n"));
+  EXPECT_EQ(checksums(), 2U);
+}
+
 TEST_F(ResultFileTest, TheColumnOfRepeatsIsRefusedWhereTheFileIsNotAsItWasWritten) {
   open();
   add(success(1, 1, 1), 1.0);

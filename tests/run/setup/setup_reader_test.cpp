@@ -32,7 +32,7 @@ TEST_F(SetupReaderTest, FillsTheConfigurationOfAnOptimisation) {
   EXPECT_EQ(config.measureFile, folder_ / "model/measures.txt");
   const auto& task = dynamic_cast<const OptimisationTask&>(*config.task);
   EXPECT_EQ(task.method->populationSize(), 20);
-  EXPECT_EQ(dynamic_cast<const PopulationMethod&>(*task.method).simplex.pointCount, 5);
+  EXPECT_EQ(dynamic_cast<const SimplexMethod&>(*task.method).simplex.pointCount, 5);
   EXPECT_THAT(read("Option = 2 => 0").parameters[0].givenValues, ElementsAre(412.5));
 }
 

@@ -209,7 +209,7 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
        "Perturbed value for parameter Depth in local sensitivity analysis out of bounds",
        "0.75 of the range, from 412.5, leaves the bounds 100 to 900 both ways (logarithms)"},
       {"Upper_Bound = 1.0 => 0.31 & Lower_Bound = 0.0 => 0.31", "Lower bound equal to upper bound for parameter Rate",
-       "expected more than 0.31 for a search by SCE, PSE or OPSE; Parameter_Type = 1 fixes a parameter"},
+       "expected more than 0.31 for a search by SCE, PSE, OPSE or CMA-ES; Parameter_Type = 1 fixes a parameter"},
       {"Algorithm_Type = 1 => 0 & No_Points_Subcomplex = 6 => 8",
        "No. of points in a subcomplex in SCE algorithm invalid", "at most the 7 points of a complex, found 8"},
       {"No_Points_Simplex = 5 => 21", "No. of points in a simplex in PSE algorithm invalid", "at most the 20 points"},
@@ -230,12 +230,17 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
       {earlier + "'setup_Optimisation.dat'\nEarlier_Result_Sets = 0", "No. of sets of the earlier result file invalid",
        "expected 1 or more, found 0"},
       {"Initial_Sample_Generation = 4 => Initial_Sample_Generation = 4\nEarlier_Result_File = 'other.dat'",
-       "Earlier result file invalid", "expected this or Initial_Sample_Generation = 4, found both"},
+       "Earlier result file invalid",
+       "expected this or Initial_Sample_Generation = 4, found both. Leave out the latter"},
+      {"'sample.txt' => '' & Initial_Sample_Generation = 4 => Initial_Sample_Generation = 4\nEarlier_Result_File = "
+       "'other.dat'",
+       "Earlier result file invalid",
+       "setup.kdx:143:23: Earlier_Result_File: expected this or Initial_Sample_Generation = 4"},
       {"Algorithm_Type = 1 => 'PDDS' & [SURROGATE_MODEL_PARAMETERS] => [X] & [/SURROGATE_MODEL_PARAMETERS] => [/X]",
        "Unable to open section SURROGATE_MODEL_PARAMETERS in KDX file",
        "Use_Surrogate_Model: Parallel Dynamically Dimensioned Search uses no surrogate model: expected 0"},
       {"Algorithm_Type = 1 => 3", "Invalid optimisation algorithm type selection",
-       "expected 0 to 2 or one of the names 'SCE', 'PSE', 'DDS', 'PDDS', 'OPSE', found 3"},
+       "expected 0 to 2 or one of the names 'SCE', 'PSE', 'DDS', 'PDDS', 'OPSE', 'CMA-ES', found 3"},
       {"'sample.txt' => ''", "Unable to open ", "expected the name of a file, found a blank text"},
       {"'sample.txt' => 'none.txt'", "Unable to open none.txt", "No such file"},
       {"Neighbourhood_Size = 60 => 5 & Sampling_rate = 30 => 0",
@@ -245,10 +250,12 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
        "Population size and/or initial No. of generations too small for surrogate modelling optimisation",
        "Neighbourhood_Size = 61 evaluated sets before the surrogate is fitted, found 60"},
       {"Algorithm_Type = 1 => 2", "Use Population Simplex Evolution algorithm for application with multiple processors",
-       "expected 1 with this Algorithm_Type, found 4; several model runs at a time: Algorithm_Type = 'PSE', 'PDDS' "
-       "or 'OPSE', or a job of several processes (MPI), in which SCE runs one proposal of each complex at once"},
+       "expected 1 with this Algorithm_Type, found 4; several model runs at a time: Algorithm_Type = 'PSE', "
+       "'PDDS', 'OPSE' or 'CMA-ES', or a job of several processes (MPI), in which SCE runs one proposal of each "
+       "complex at once"},
       {"Algorithm_Type = 1 => 0", "Use Population Simplex Evolution algorithm for application with multiple processors",
-       "found 4; several model runs at a time: Algorithm_Type = 'PSE', 'PDDS' or 'OPSE', or a job of several processes "
+       "found 4; several model runs at a time: Algorithm_Type = 'PSE', 'PDDS', 'OPSE' or 'CMA-ES', or a job of several "
+       "processes "
        "(MPI)"},
       {"Algorithm_Type = 1 => 'PDDS' & Max_No_Evaluations = 500 => 0",
        "Maximum No. of model evaluations in PDDS algorithm invalid", ""},
@@ -336,9 +343,15 @@ std::vector<RowInSetup> rowsInSetups(const std::string& setup) {
   static const std::pair<std::string_view, const char*> kOptions[] = {
       {"SCENARIOS", "0"}, {"SENSITIVITY_ANALYSIS", "1"}, {"UNCERTAINTY_ESTIMATION", "3"}};
   static const std::pair<std::string_view, const char*> kAlgorithms[] = {
-      {"SCE_", "0"}, {"DDS_", "2"}, {"PDDS_", "'PDDS'"}, {"OPSE_", "'OPSE'"}};
+      {"SCE_", "0"}, {"DDS_", "2"}, {"PDDS_", "'PDDS'"}, {"OPSE_", "'OPSE'"}, {"CMAES_", "'CMA-ES'"}};
+  static const std::pair<std::string_view, const char*> kForms[] = {{"/MORRIS", "'Morris'"}};
   std::vector<RowInSetup> found;
   for (const SectionRow* section : setupSchema().sections()) {
+    // Which keywords of these are read depends on others of them: tests/run/tasks/distribution_reading_test.cpp.
+    const bool isOfDistributions = section->path.ends_with("Y_ESTIMATION/PARAMETER_n") ||
+                                   section->path.ends_with("Y_ANALYSIS/PARAMETER_n") ||
+                                   section->path.find("/CORRELATIONS") != std::string_view::npos;
+    if (isOfDistributions) continue;
     std::string text = setup;
     for (const auto& [start, option] : kOptions) {
       if (section->path.starts_with(start)) {
@@ -349,6 +362,10 @@ std::vector<RowInSetup> rowsInSetups(const std::string& setup) {
       if (section->path.find(start) == std::string_view::npos) continue;
       text = SetupFixture::withValue(text, "OPTIMISATION_ALGORITHM", "Algorithm_Type", algorithm);
       text = SetupFixture::withValue(text, "SimultaneousSimulations", "NoSimultaneousSim", "1");
+    }
+    for (const auto& [end, form] : kForms) {
+      if (!section->path.ends_with(end)) continue;
+      text = SetupFixture::withValue(text, "SENSITIVITY_ANALYSIS", "Sensitivity_Type", form);
     }
     for (const KeywordRow& row : section->keywords) {
       if (row.store != nullptr) found.push_back({section, &row, text});

@@ -1,0 +1,319 @@
+#include "algorithms/analyses/sobol_report.h"
+
+#include <algorithm>
+#include <bit>
+#include <cmath>
+#include <numeric>
+
+#include <fmt/format.h>
+
+#include "algorithms/numbers/sample_summary.h"
+#include "common/run_files.h"
+#include "common/text.h"
+
+namespace mirevo {
+namespace {
+
+constexpr std::size_t kMostShownFactors = 20;
+constexpr std::size_t kMostNames = 10;
+/// Limits farther than this from an index leave open which factor matters more.
+constexpr double kWideHalfWidth = 0.1;
+
+std::string share(double value) {
+  return fmt::format("{:.3f}", value == 0.0 ? 0.0 : value);
+}
+
+std::string limitsText(const SobolIndex& index) {
+  return fmt::format("{} to {}", share(index.lower), share(index.upper));
+}
+
+/// The positions of the indices, the largest first, NaN last.
+std::vector<std::size_t> descending(std::span<const SobolIndex> indices) {
+  std::vector<std::size_t> order(indices.size());
+  std::iota(order.begin(), order.end(), std::size_t{0});
+  const auto key = [&](std::size_t i) { return std::isnan(indices[i].value) ? -INFINITY : indices[i].value; };
+  std::stable_sort(order.begin(), order.end(), [&](std::size_t a, std::size_t b) { return key(a) > key(b); });
+  return order;
+}
+
+/// "a (0.1 to 0.2), b (0.01 to 0.3) and 3 more"
+std::string namesWithLimits(std::span<const std::string> names, std::span<const SobolIndex> indices,
+                            std::span<const std::size_t> chosen) {
+  std::string text;
+  for (std::size_t i = 0; i < std::min(chosen.size(), kMostNames); ++i) {
+    text += fmt::format("{}{} ({})", i == 0 ? "" : ", ", names[chosen[i]], limitsText(indices[chosen[i]]));
+  }
+  if (chosen.size() > kMostNames) text += fmt::format(" and {} more", chosen.size() - kMostNames);
+  return text;
+}
+
+std::vector<std::string> factorNames(const SobolFindings& findings) {
+  std::vector<std::string> names;
+  for (const SobolFactor& factor : findings.factors) names.push_back(factor.name);
+  return names;
+}
+
+std::vector<std::string> pairNames(const SobolFindings& findings) {
+  std::vector<std::string> names;
+  for (const auto& [j, l] : findings.design.pairs()) {
+    names.push_back(fmt::format("{} and {}", findings.factors[j].name, findings.factors[l].name));
+  }
+  return names;
+}
+
+bool isShown(const SobolFindings& findings, const SobolOutput& output) {
+  const auto isObjective = [](const SobolOutput& one) { return one.kind == "objective"; };
+  return isObjective(output) || std::ranges::none_of(findings.outputs, isObjective);
+}
+
+std::string kindText(const SobolOutput& output) {
+  return output.kind == "objective" ? "Objective function" : "Output measure";
+}
+
+void appendTable(const SobolFindings& findings, const SobolOutput& output, std::vector<std::string>& lines) {
+  const SobolIndices& indices = output.indices;
+  static const std::vector<std::string> kHeadings{"First-order", "lower", "upper", "Total", "lower", "upper"};
+  std::vector<std::string> names;
+  std::vector<std::vector<double>> rows;
+  const auto add = [&](const std::string& name, const SobolIndex& first, const SobolIndex& total) {
+    names.push_back(name);
+    rows.push_back({first.value, first.lower, first.upper, total.value, total.lower, total.upper});
+  };
+  std::vector<std::size_t> order = descending(indices.total);
+  const std::size_t left = order.size() - std::min(order.size(), kMostShownFactors);
+  order.resize(order.size() - left);
+  for (const std::size_t j : order) add(findings.factors[j].name, indices.first[j], indices.total[j]);
+  add("Sum", indices.sumOfFirst, indices.sumOfTotal);
+  for (std::string& line : formatTable("Share of the variance", kHeadings, names, rows)) {
+    lines.push_back(std::move(line));
+  }
+  if (left > 0) lines.push_back(fmt::format("   {} more have smaller total indices", left));
+}
+
+/// The factors that meet a condition, those with the largest total index first.
+template <class Condition>
+std::vector<std::size_t> factorsWhere(const SobolIndices& indices, Condition isMet) {
+  std::vector<std::size_t> chosen = descending(indices.total);
+  std::erase_if(chosen, [&](std::size_t j) { return !isMet(j); });
+  return chosen;
+}
+
+void appendFixable(const SobolFindings& findings, const SobolOutput& output, std::vector<std::string>& lines) {
+  const SobolIndices& indices = output.indices;
+  const double limit = findings.negligibleIndex;
+  const auto fixable = factorsWhere(indices, [&](std::size_t j) { return indices.total[j].upper < limit; });
+  const std::vector<std::string> names = factorNames(findings);
+  if (fixable.empty()) {
+    lines.push_back(
+        fmt::format("   No parameter can be fixed: none has a total index that is below {:g} for certain", limit));
+  } else {
+    double most = 0.0;
+    for (const std::size_t j : fixable) most += indices.total[j].upper;
+    lines.push_back(fmt::format("   Can be fixed, as the upper limit of the total index is below {:g}: {}", limit,
+                                namesWithLimits(names, indices.total, fixable)));
+    if (fixable.size() > 1) {
+      lines.push_back(fmt::format("   All of these fixed together cost at most {} of the variance", share(most)));
+    }
+  }
+  const auto open = factorsWhere(
+      indices, [&](std::size_t j) { return !(indices.total[j].upper < limit) && !(indices.total[j].lower >= limit); });
+  if (!open.empty()) {
+    lines.push_back(fmt::format("   Undecided, as the limits of the total index include {:g}: {}", limit,
+                                namesWithLimits(names, indices.total, open)));
+  }
+}
+
+void appendInteractions(const SobolFindings& findings, const SobolOutput& output, std::vector<std::string>& lines) {
+  const SobolIndices& indices = output.indices;
+  if (!std::isnan(indices.sumOfFirst.value)) {
+    lines.push_back(fmt::format(
+        "   By themselves the parameters explain {} ({}) of the variance; interactions explain what is missing to 1",
+        share(indices.sumOfFirst.value), limitsText(indices.sumOfFirst)));
+  }
+  const auto interacting = factorsWhere(indices, [&](std::size_t j) {
+    return indices.interactions[j].lower > 0.0 && indices.interactions[j].value >= findings.negligibleIndex;
+  });
+  if (!interacting.empty()) {
+    lines.push_back(fmt::format("   Interact with others, with shares of the variance of: {}",
+                                namesWithLimits(factorNames(findings), indices.interactions, interacting)));
+  }
+  std::vector<std::size_t> pairs = descending(indices.second);
+  std::erase_if(pairs, [&](std::size_t m) { return !(indices.second[m].lower > 0.0); });
+  if (!pairs.empty()) {
+    lines.push_back(fmt::format("   Interactions of two that are above 0 for certain: {}",
+                                namesWithLimits(pairNames(findings), indices.second, pairs)));
+  } else if (!indices.second.empty()) {
+    lines.emplace_back("   No interaction of two is above 0 for certain");
+  }
+}
+
+/// What negative estimates mean.
+void appendNegative(const SobolFindings& findings, const SobolOutput& output, std::vector<std::string>& lines) {
+  const std::vector<SobolIndex>& first = output.indices.first;
+  std::vector<std::size_t> negative;
+  for (const std::size_t j : descending(first)) {
+    if (first[j].value < 0.0) negative.push_back(j);
+  }
+  if (negative.empty()) return;
+  std::ranges::reverse(negative);
+  lines.push_back(fmt::format(
+      "   First-order indices estimated below 0: {}. An index cannot be negative: this is the noise of the estimate, "
+      "and where the limits hold 0 no effect of the parameter by itself was found",
+      namesWithLimits(factorNames(findings), first, negative)));
+  const auto surely = std::ranges::count_if(negative, [&](std::size_t j) { return first[j].upper < 0.0; });
+  if (surely > 0) {
+    lines.push_back(fmt::format("   {} of them {} even the upper limit below 0, as one in forty may by chance", surely,
+                                surely == 1 ? "has" : "have"));
+  }
+}
+
+void appendConvergence(const SobolOutput& output, std::vector<std::string>& lines) {
+  if (output.stages.size() < 2) return;
+  const SobolStage& half = output.stages[output.stages.size() - 2];
+  double largest = 0.0;
+  for (std::size_t j = 0; j < half.total.size(); ++j) {
+    const double difference = std::abs(half.total[j].value - output.indices.total[j].value);
+    if (std::isfinite(difference)) largest = std::max(largest, difference);
+  }
+  lines.push_back(
+      fmt::format("   The first {} of the {} blocks give total indices that differ from these by at most {}", half.rows,
+                  output.stages.back().rows, share(largest)));
+}
+
+/// The largest distance of a limit from its index, NaN if there is none.
+double widest(const SobolIndices& indices) {
+  double most = std::numeric_limits<double>::quiet_NaN();
+  for (const std::vector<SobolIndex>* of : {&indices.first, &indices.total}) {
+    for (const SobolIndex& index : *of) most = std::fmax(most, 0.5 * (index.upper - index.lower));
+  }
+  return most;
+}
+
+}  // namespace
+
+SobolOutput sobolOutput(const SobolDesign& design, std::span<const double> values, const ReplicateBootstrap& bootstrap,
+                        std::string kind, std::string name) {
+  SobolOutput output{std::move(kind), std::move(name), sobolIndices(design, values, bootstrap, bootstrap.size()), {}};
+  for (const std::size_t part : {std::size_t{8}, std::size_t{4}, std::size_t{2}}) {
+    SobolDesign stage = design;
+    stage.rows = design.rows / part;
+    if (stage.rows < 2 * kSobolReplicates) continue;
+    SobolIndices found = sobolIndices(stage, values.first(stage.setCount()), bootstrap, bootstrap.size(), false);
+    output.stages.push_back({stage.rows, std::move(found.first), std::move(found.total)});
+  }
+  output.stages.push_back({design.rows, output.indices.first, output.indices.total});
+  return output;
+}
+
+std::vector<DataTable> sobolTables(const SobolFindings& findings) {
+  DataTable all;
+  all.file = run_files::kSobol;
+  all.headLines = {
+      "Sobol' indices, shares of the variance of an output, with limits of 95 % and the blocks of the design used"};
+  for (const SobolFactor& factor : findings.factors) {
+    if (factor.parameters.size() == 1 && findings.parameters[factor.parameters.front()] == factor.name) continue;
+    std::string members;
+    for (const std::size_t j : factor.parameters) members += (members.empty() ? "" : ", ") + findings.parameters[j];
+    all.headLines.push_back(fmt::format("Group {}: {}", factor.name, members));
+  }
+  all.columns = {"Kind", "Output", "Parameter", "With", "Order", "Index", "Lower", "Upper", "Blocks", "Variance"};
+  DataTable stages;
+  stages.file = run_files::kSobolConvergence;
+  stages.headLines = {"Sobol' indices from the first blocks of the design, with limits of 95 %"};
+  stages.columns = {"Kind", "Output", "Parameter", "Order", "Rows", "Index", "Lower", "Upper"};
+  const std::vector<SobolFactor>& factors = findings.factors;
+  for (const SobolOutput& output : findings.outputs) {
+    const SobolIndices& indices = output.indices;
+    const auto add = [&](const std::string& parameter, const std::string& with, const char* order,
+                         const SobolIndex& index) {
+      all.rows.push_back({output.kind, output.name, parameter, with, std::string(order), index.value, index.lower,
+                          index.upper, static_cast<std::int64_t>(index.blocks), indices.variance});
+    };
+    for (std::size_t j = 0; j < factors.size(); ++j) {
+      add(factors[j].name, "", "first", indices.first[j]);
+      add(factors[j].name, "", "total", indices.total[j]);
+      add(factors[j].name, "", "interactions", indices.interactions[j]);
+    }
+    add("", "", "sum of first", indices.sumOfFirst);
+    add("", "", "sum of total", indices.sumOfTotal);
+    const auto pairs = findings.design.pairs();
+    for (std::size_t m = 0; m < pairs.size(); ++m) {
+      add(factors[pairs[m].first].name, factors[pairs[m].second].name, "second", indices.second[m]);
+    }
+    for (const SobolStage& stage : output.stages) {
+      for (std::size_t j = 0; j < factors.size(); ++j) {
+        for (const bool isTotal : {false, true}) {
+          const SobolIndex& index = isTotal ? stage.total[j] : stage.first[j];
+          stages.rows.push_back({output.kind, output.name, factors[j].name, std::string(isTotal ? "total" : "first"),
+                                 static_cast<std::int64_t>(stage.rows), index.value, index.lower, index.upper});
+        }
+      }
+    }
+  }
+  return {std::move(all), std::move(stages)};
+}
+
+std::vector<std::string> formatSobol(const SobolFindings& findings, std::string_view tableFile) {
+  std::vector<std::string> lines{
+      fmt::format("Sobol' sensitivity analysis: {} blocks of {} model runs for {}, {} of {} evaluations failed",
+                  findings.design.rows, findings.design.setsPerRow(), factorCountText(findings.factors),
+                  findings.failedCount, findings.runCount)};
+  if (findings.failedCount > 0) {
+    lines.emplace_back(
+        "   A failed run is left out of the estimates that need it, whose limits are the wider, and of no other");
+  }
+  for (const SobolOutput& output : findings.outputs) {
+    if (!isShown(findings, output)) continue;
+    const SobolIndices& indices = output.indices;
+    lines.emplace_back();
+    if (indices.isConstant || indices.valueCount < 2) {
+      lines.push_back(fmt::format("{} {}: {}", kindText(output), output.name,
+                                  indices.isConstant ? "no parameter has an influence, all runs have the same value"
+                                                     : "no indices, too few runs succeeded"));
+      continue;
+    }
+    lines.push_back(fmt::format("{} {}: mean {:.6g}, standard deviation {:.6g}; indices with limits of 95 %",
+                                kindText(output), output.name, indices.mean, std::sqrt(indices.variance)));
+    appendTable(findings, output, lines);
+    appendFixable(findings, output, lines);
+    appendInteractions(findings, output, lines);
+    appendNegative(findings, output, lines);
+    appendConvergence(output, lines);
+  }
+  lines.emplace_back();
+  lines.push_back(fmt::format("   The indices of all output measures and objective functions are in {}", tableFile));
+  return lines;
+}
+
+std::vector<std::string> sobolWarnings(const SobolFindings& findings) {
+  std::vector<std::string> warnings;
+  double most = 0.0;
+  std::string name;
+  for (const SobolOutput& output : findings.outputs) {
+    const double width = widest(output.indices);
+    if (!isShown(findings, output) || !(width > most)) continue;
+    most = width;
+    name = output.name;
+  }
+  if (most > kWideHalfWidth) {
+    // The limits narrow with the root of the sample at least.
+    const double wanted = static_cast<double>(findings.design.rows) * std::pow(most / kWideHalfWidth, 2);
+    warnings.push_back(fmt::format(
+        "The design is too small to tell which parameter matters more: limits of the indices of {} are {} away from "
+        "them. Sample_Size = {} would bring them to about {:g}",
+        name, share(most), std::bit_ceil(static_cast<std::uint64_t>(std::ceil(wanted))), kWideHalfWidth));
+  }
+  const double failed =
+      static_cast<double>(findings.failedCount) / static_cast<double>(std::max<std::size_t>(findings.runCount, 1));
+  if (failed > 0.05) {
+    warnings.push_back(fmt::format(
+        "{:.0f} % of the model runs failed. Failures at random widen the limits alone, but if they come with certain "
+        "parameter values, the indices are those of the rest of the ranges: the failures may tell which, and narrower "
+        "ranges avoid "
+        "them",
+        100.0 * failed));
+  }
+  return warnings;
+}
+
+}  // namespace mirevo

@@ -1,0 +1,94 @@
+#include "algorithms/distributions/gaussian_copula.h"
+
+#include <algorithm>
+#include <cmath>
+#include <numbers>
+
+#include <fmt/format.h>
+
+#include "algorithms/numbers/lapack.h"
+#include "algorithms/numbers/sample_summary.h"
+#include "common/fatal_error.h"
+
+namespace mirevo {
+namespace {
+
+/// The Cholesky factor of R - shift I, column by column; empty if that is not positive definite.
+std::vector<double> factorOf(std::span<const std::vector<double>> correlations, double shift) {
+  const std::size_t n = correlations.size();
+  std::vector<double> matrix(n * n);
+  for (std::size_t j = 0; j < n; ++j) {
+    for (std::size_t i = 0; i < n; ++i) matrix[j * n + i] = correlations[i][j] - (i == j ? shift : 0.0);
+  }
+  if (!choleskyFactor(matrix.data(), static_cast<int>(n))) matrix.clear();
+  return matrix;
+}
+
+/// Those that are furthest from 0, as it is among them that a contradiction is to be sought.
+std::string largestText(std::span<const std::vector<double>> correlations, std::span<const std::string> names) {
+  std::string text;
+  for (const auto& [i, j] : largestEntries(correlations)) {
+    if (correlations[i][j] == 0.0) break;
+    text += fmt::format("{}{} and {} {:.6g}", text.empty() ? "" : ", ", names[i], names[j], correlations[i][j]);
+  }
+  return text;
+}
+
+}  // namespace
+
+GaussianCopula::GaussianCopula(std::vector<std::vector<double>> correlations, std::span<const std::string> names)
+    : correlations_(std::move(correlations)), isCorrelated_(correlations_.size()) {
+  const std::size_t n = size();
+  const std::vector<double> factor = factorOf(correlations_, 0.0);
+  if (factor.empty()) {
+    const double smallest = smallestEigenvalue(correlations_);
+    fatalError("Error: Correlations of the parameters are not positive definite",
+               fmt::format("no distribution can have all of them: the smallest eigenvalue of their matrix is {:.4g}, "
+                           "expected above 0; the largest are {}\nIt would be positive if all were multiplied by a "
+                           "factor below {:.4g}; or correct those that contradict each other",
+                           smallest, largestText(correlations_, names), 1.0 / (1.0 - std::min(smallest, 0.0))));
+  }
+  for (std::size_t i = 0; i < n; ++i) {
+    for (std::size_t j = 0; j <= i; ++j) factor_.push_back(factor[j * n + i]);
+    logOfRoot_ += std::log(factor_.back());
+    for (std::size_t j = 0; j < n; ++j) isCorrelated_[i] = isCorrelated_[i] || (j != i && correlations_[i][j] != 0.0);
+  }
+}
+
+std::vector<double> GaussianCopula::correlated(std::span<const double> independent) const {
+  std::vector<double> scores(size());
+  std::size_t at = 0;
+  for (std::size_t i = 0; i < size(); ++i) {
+    for (std::size_t j = 0; j <= i; ++j) scores[i] += factor_[at++] * independent[j];
+  }
+  return scores;
+}
+
+double GaussianCopula::logDensity(std::span<const double> scores) const {
+  std::vector<double> independent(size());  // L^-1 z
+  double difference = 0.0;                  // z'(R^-1 - I)z
+  std::size_t at = 0;
+  for (std::size_t i = 0; i < size(); ++i) {
+    double rest = scores[i];
+    for (std::size_t j = 0; j < i; ++j) rest -= factor_[at++] * independent[j];
+    independent[i] = rest / factor_[at++];
+    difference += independent[i] * independent[i] - scores[i] * scores[i];
+  }
+  return -0.5 * difference - logOfRoot_;
+}
+
+double smallestEigenvalue(std::span<const std::vector<double>> correlations) {
+  double low = -static_cast<double>(correlations.size());  // |r| <= 1
+  double high = 1.0;                                       // the mean of the eigenvalues
+  while (high - low > 1.0e-7) {
+    const double middle = 0.5 * (low + high);
+    (factorOf(correlations, middle).empty() ? high : low) = middle;
+  }
+  return 0.5 * (low + high);
+}
+
+double ofRankCorrelation(double rankCorrelation) {
+  return 2.0 * std::sin(std::numbers::pi * rankCorrelation / 6.0);
+}
+
+}  // namespace mirevo

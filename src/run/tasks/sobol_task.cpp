@@ -1,0 +1,258 @@
+#include "run/tasks/sobol_task.h"
+
+#include <algorithm>
+#include <bit>
+#include <limits>
+
+#include <fmt/format.h>
+
+#include "algorithms/analyses/sobol_indices.h"
+#include "algorithms/analyses/sobol_report.h"
+#include "algorithms/analyses/sobol_series.h"
+#include "algorithms/numbers/sobol.h"
+#include "common/text.h"
+#include "run/tasks/analysis_names.h"
+#include "run/tasks/distribution_reading.h"
+#include "run/tasks/infeasible_sets.h"
+#include "run/tasks/sensitivity_section.h"
+#include "run/tasks/simulated_room.h"
+
+namespace mirevo {
+namespace {
+
+constexpr const char* kSobolSizeRefusal = "Error: Sample size in Sobol sensitivity analysis invalid";
+
+/// Two correlated parameters of different factors.
+std::optional<std::pair<std::size_t, std::size_t>> dependence(const ParameterDistributions& distributions,
+                                                              std::span<const SobolFactor> factors) {
+  if (!distributions.copula()) return std::nullopt;
+  std::vector<std::size_t> factorOf(distributions.size(), 0);
+  for (std::size_t f = 0; f < factors.size(); ++f) {
+    for (const std::size_t j : factors[f].parameters) factorOf[j] = f;
+  }
+  for (std::size_t i = 0; i < factorOf.size(); ++i) {
+    for (std::size_t j = 0; j < i; ++j) {
+      if (distributions.copula()->correlations()[i][j] != 0.0 && factorOf[i] != factorOf[j]) return std::pair{j, i};
+    }
+  }
+  return std::nullopt;
+}
+
+/// The results by their sets; null for a set that was not run or failed.
+std::vector<const EvaluationResult*> bySet(std::span<const EvaluationResult> results, std::size_t setCount) {
+  std::vector<const EvaluationResult*> ofSets(setCount, nullptr);
+  for (const EvaluationResult& result : results) {
+    const auto set = static_cast<std::size_t>(result.number) - 1;
+    if (result.number >= 1 && set < setCount && result.ok()) ofSets[set] = &result;
+  }
+  return ofSets;
+}
+
+std::span<const double> measuresOf(const EvaluationResult& result) {
+  return result.exactMeasures.empty() ? result.measureValues : result.exactMeasures;
+}
+
+/// `valueOf(result)` of every set, NaN without a result.
+template <class ValueOf>
+std::vector<double> valuesOf(std::span<const EvaluationResult* const> ofSets, ValueOf valueOf) {
+  std::vector<double> values;
+  values.reserve(ofSets.size());
+  for (const EvaluationResult* result : ofSets) {
+    values.push_back(result == nullptr ? std::numeric_limits<double>::quiet_NaN() : valueOf(*result));
+  }
+  return values;
+}
+
+std::vector<SobolOutput> outputsOf(const TaskContext& context, const SobolDesign& design,
+                                   std::span<const EvaluationResult* const> ofSets,
+                                   const ReplicateBootstrap& bootstrap) {
+  std::vector<SobolOutput> outputs;
+  for (std::size_t i = 0; i < context.measures.size(); ++i) {
+    const std::vector<double> values =
+        valuesOf(ofSets, [i](const EvaluationResult& result) { return measuresOf(result)[i]; });
+    outputs.push_back(sobolOutput(design, values, bootstrap, "measure", context.measures[i].name));
+  }
+  for (std::size_t i = 0; i < context.objectives.size(); ++i) {
+    const std::vector<double> values = valuesOf(ofSets, [&](const EvaluationResult& result) {
+      return result.exactMeasures.empty()
+                 ? result.objectiveValues[i]
+                 : objectiveFunctionValues(context.objectives.subspan(i, 1), result.exactMeasures).front();
+    });
+    outputs.push_back(sobolOutput(design, values, bootstrap, "objective", context.objectives[i].name));
+  }
+  return outputs;
+}
+
+/// "K at 63 %, FC at 37 % of 365 times"
+std::string leadersText(const SobolSeries& series, std::span<const SobolFactor> factors) {
+  std::vector<std::size_t> order;
+  for (std::size_t j = 0; j < factors.size(); ++j) {
+    if (series.largestCounts[j] > 0) order.push_back(j);
+  }
+  std::ranges::stable_sort(order, std::ranges::greater{}, [&](std::size_t j) { return series.largestCounts[j]; });
+  constexpr std::size_t kMost = 5;
+  std::string text;
+  for (std::size_t i = 0; i < std::min(order.size(), kMost); ++i) {
+    text += fmt::format(
+        "{}{} at {:.0f} %", i == 0 ? "" : ", ", factors[order[i]].name,
+        100.0 * static_cast<double>(series.largestCounts[order[i]]) / static_cast<double>(series.timeCount));
+  }
+  return text + fmt::format(" of {} times", series.timeCount);
+}
+
+}  // namespace
+
+/// What is drawn from the run's random numbers, in this order.
+struct SobolTask::Drawn {
+  UniformGenerator random;
+  ReplicateBootstrap bootstrap;
+};
+
+SobolTask::Drawn SobolTask::draw() const {
+  UniformGenerator random(randomSeed);
+  const ReplicateBootstrap bootstrap(static_cast<std::size_t>(settings.bootstrapSamples), random);
+  return {random, bootstrap};
+}
+
+const TaskFacts& SobolTask::facts() const {
+  static constexpr TaskFacts kFacts{{1, "sensitivity"},
+                                    "sensitivity analysis",
+                                    run_files::kSensitivity,
+                                    {kSensitivitySection, kSensitivityTypeKeyword, {std::nullopt, kSobolName}}};
+  return kFacts;
+}
+
+std::vector<const SectionRow*> SobolTask::sections() const {
+  return {&sobolSection().row};
+}
+
+std::vector<std::string> SobolTask::neededSections(const SetupSection& /*target*/) const {
+  return {std::string(sensitivitySection().row.path), std::string(sobolSection().row.path)};
+}
+
+void SobolTask::read(const TaskReading& reading) {
+  const SetupSection section = reading.target.open(kSensitivitySection);
+  section.read(sensitivitySection(), *static_cast<Task*>(this));
+  const SetupSection own = section.open("SOBOL");
+  own.read(sobolSection(), settings);
+  distributions_ = readDistributions(reading, section);
+  if (2 * reading.variableCount > kMaxSobolDimension) {
+    own.refuse("Error: Too many parameters for a Sobol sensitivity analysis", kSobolSampleSizeKeyword,
+               fmt::format("expected at most {} variable parameters, found {}: 'Morris' finds those that matter among "
+                           "more",
+                           kMaxSobolDimension / 2, reading.variableCount));
+  }
+  const SearchSpace space = BuildSearchSpace(reading.parameters);
+  std::string problem;
+  factors_ = sobolFactors(space.names, settings.groups, problem);
+  if (!problem.empty()) own.refuse("Error: Invalid group in Sobol sensitivity analysis", kSobolGroupKeyword, problem);
+  if (const auto pair = dependence(distributions_, factors_)) {
+    own.refuse(
+        "Error: Sobol sensitivity analysis of correlated parameters", kSobolGroupKeyword,
+        fmt::format("parameters '{}' and '{}' are correlated, and the variance is not the sum of shares of each: "
+                    "leave the correlation out, or put parameters that are correlated into one group",
+                    trimTrailing(space.names[pair->first]), trimTrailing(space.names[pair->second])));
+  }
+  design_ = {static_cast<std::size_t>(settings.sampleSize), factors_.size(), settings.hasSecondOrder};
+  const auto sets = static_cast<std::int64_t>(design_.setCount());
+  if (const auto tooMany = tooManySets(sets, reading.variableCount)) {
+    own.refuse(kSobolSizeRefusal, kSobolSampleSizeKeyword,
+               fmt::format("{}, found {} blocks of {} sets", *tooMany, settings.sampleSize, design_.setsPerRow()));
+  }
+}
+
+std::optional<KeptSteps> SobolTask::keptSteps() const {
+  if (settings.seriesTimes != SobolSeriesTimes::steps) return std::nullopt;
+  return KeptSteps{};
+}
+
+std::string SobolTask::description() const {
+  return fmt::format("Sensitivity analysis: Sobol' indices, first-order and total{}",
+                     settings.hasSecondOrder ? ", and second order" : "");
+}
+
+std::vector<std::string> SobolTask::summaryLines(const SearchSpace& /*space*/) const {
+  return {fmt::format("Design: {} blocks of {} model runs for {}, {} in all", design_.rows, design_.setsPerRow(),
+                      factorCountText(factors_), design_.setCount())};
+}
+
+std::vector<std::string> SobolTask::warnings(const SearchSpace& /*space*/) const {
+  const std::size_t rows = design_.rows;
+  if (std::has_single_bit(rows)) return {};
+  return {fmt::format("{} = {} is no power of two: the points of the design are less even than those of {}",
+                      kSobolSampleSizeKeyword, rows, std::bit_floor(rows))};
+}
+
+TaskOutcome SobolTask::outcomeOf(const TaskContext& context, std::span<const EvaluationResult> results,
+                                 std::vector<std::string>& warnings) const {
+  TaskOutcome outcome{std::string(kEndOfTask)};
+  SobolFindings findings{.design = design_,
+                         .factors = factors_,
+                         .parameters = context.space.names,
+                         .outputs = {},
+                         .runCount = results.size(),
+                         .failedCount = 0,
+                         .negligibleIndex = settings.negligibleIndex};
+  std::size_t last = 0;
+  for (const EvaluationResult& result : results) {
+    last = std::max(last, static_cast<std::size_t>(result.number));
+    if (!result.ok()) ++findings.failedCount;
+  }
+  // Of an interrupted run the blocks that it had begun.
+  findings.design.rows = std::min(design_.rows, (last + design_.setsPerRow() - 1) / design_.setsPerRow());
+  const ReplicateBootstrap bootstrap = draw().bootstrap;
+  const std::vector<const EvaluationResult*> ofSets = bySet(results, findings.design.setCount());
+  findings.outputs = outputsOf(context, findings.design, ofSets, bootstrap);
+  outcome.report = formatSobol(findings, fileNameOf(runFilePath(context.filePrefix, run_files::kSobol)));
+  outcome.tables = sobolTables(findings);
+  warnings = sobolWarnings(findings);
+
+  std::vector<int> numbers;
+  std::vector<std::size_t> sets;
+  for (std::size_t set = 0; set < ofSets.size(); ++set) {
+    if (ofSets[set] == nullptr) continue;
+    numbers.push_back(static_cast<int>(set) + 1);
+    sets.push_back(set);
+  }
+  std::size_t first = 0;
+  for (const ObservedSeries& observed : context.observedSeries) {
+    if (!keepsSimulatedValues()) break;
+    const std::string& name = context.measures[observed.measure].name;
+    const SobolSeries series = sobolSeries(
+        name, observed, findings.design, factors_, sets,
+        [&](std::size_t index, std::size_t count) { return context.simulatedColumns(numbers, first + index, count); },
+        bootstrap);
+    first += observed.days.size();
+    outcome.files.push_back(
+        {runFilePath(context.filePrefix, run_files::kSobolSeries, static_cast<int>(observed.measure) + 1),
+         series.text});
+    outcome.report.push_back(series.timeCount == 0 ? fmt::format("   Series of {}: no parameter has an influence", name)
+                                                   : fmt::format("   Series of {}, largest total index: {}", name,
+                                                                 leadersText(series, factors_)));
+    outcome.report.push_back("   " + outcome.files.back().path);
+  }
+  return outcome;
+}
+
+TaskOutcome SobolTask::run(const TaskContext& context) {
+  std::vector<EvaluationResult> results;
+  {
+    UniformGenerator random = draw().random;
+    const std::vector<ParameterSet> sets = sobolSets(design_, factors_, distributions_, random);
+    warnOfInfeasibleSets(context, sets, "sets of the design", static_cast<int>(sets.size()));
+    if (keepsSimulatedValues()) logRoomOfSimulatedValues(context, facts().resultFiles.simulatedValues, sets.size());
+    results = context.evaluator.evaluateParameterSets(sets, DispatchMode::task);
+  }
+  std::vector<std::string> warnings;
+  TaskOutcome outcome = outcomeOf(context, results, warnings);
+  logReport(context, outcome.report);
+  for (const std::string& warning : warnings) context.log.warning(warning);
+  return outcome;
+}
+
+std::optional<TaskOutcome> SobolTask::unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const {
+  std::vector<std::string> warnings;
+  return outcomeOf(context, made.results, warnings);
+}
+
+}  // namespace mirevo

@@ -1,0 +1,293 @@
+#include "algorithms/analyses/morris.h"
+
+#include <algorithm>
+#include <cmath>
+#include <map>
+#include <set>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "algorithms/function_evaluator.h"
+#include "algorithms/numbers/uniform_generator.h"
+#include "algorithms/screening_functions.h"
+#include "matchers.h"
+
+namespace mirevo {
+namespace {
+
+constexpr EffectDesign kDesigns[] = {EffectDesign::radial, EffectDesign::trajectories};
+
+ModelParameter parameter(const std::string& name, double lower, double upper,
+                         TransformationType type = TransformationType::none) {
+  return {lower, lower, upper, type, ParameterType::variable, 0.0, name};
+}
+
+SearchSpace spaceOf(std::size_t count, double lower = 0.0, double upper = 1.0) {
+  std::vector<ModelParameter> parameters;
+  for (std::size_t i = 0; i < count; ++i) parameters.push_back(parameter("p" + std::to_string(i), lower, upper));
+  return BuildSearchSpace(parameters);
+}
+
+/// A space with all kinds of parameters; that of the last one is a single value.
+SearchSpace mixedSpace() {
+  const auto integer = TransformationType::integer;
+  return BuildSearchSpace(std::vector{parameter("a", -1.0, 3.0),
+                                      parameter("log", 1.0, std::exp(2.0), TransformationType::logarithmic),
+                                      parameter("choice", 3.0, 4.0, integer), parameter("steps", 1.0, 11.0, integer),
+                                      parameter("single", 2.0, 2.0, integer)});
+}
+
+struct Screening {
+  EffectPlan plan;
+  EffectResults results;
+  MorrisOutcome outcome;
+};
+
+template <class Function>
+Screening screen(const MorrisSettings& settings, const SearchSpace& space, const Function& function,
+                 const Feasibility& feasibility = {}) {
+  const ParameterDistributions distributions = ParameterDistributions::uniform(space);
+  Screening made{planEffects(settings, space, distributions, 1, feasibility), {}, {}};
+  int number = 0;
+  FunctionEvaluator evaluator([&](const ParameterSet& set) { return function(++number, ToModelScale(space, set)); });
+  evaluateEffects(made.plan, distributions, evaluator, made.results);
+  EXPECT_EQ(evaluator.evaluationCount, made.plan.evaluationCount);
+  made.outcome = screenParameters(made.plan, made.results, settings, 1, {}, {space.names, {"y"}, {}});
+  return made;
+}
+
+TEST(ElementaryEffects, EveryPairOfSetsDiffersInOneParameterByTheStep) {
+  const SearchSpace space = mixedSpace();
+  const ParameterDistributions distributions = ParameterDistributions::uniform(space);
+  for (const EffectDesign design : kDesigns) {
+    const MorrisSettings settings{.design = design, .trajectories = 40};
+    const EffectPlan plan = planEffects(settings, space, distributions, 7);
+    std::vector<ParameterSet> sets;
+    std::map<std::size_t, int> effects;
+    for (const EffectTrajectory& trajectory : plan.trajectories) {
+      for (ParameterSet& set : setsOf(plan, trajectory, distributions)) sets.push_back(std::move(set));
+      for (const EffectPair& pair : pairsOf(plan, trajectory)) {
+        ++effects[pair.parameter];
+        const auto from = ToModelScale(space, sets.at(static_cast<std::size_t>(pair.from - 1)));
+        const auto to = ToModelScale(space, sets.at(static_cast<std::size_t>(pair.to - 1)));
+        for (std::size_t k = 0; k < space.size(); ++k) EXPECT_EQ(from[k] != to[k], k == pair.parameter);
+        const double change = to[pair.parameter] - from[pair.parameter];
+        const double shares[] = {change / 4.0, std::log(to[1] / from[1]) / 2.0, change, change / 10.0};
+        EXPECT_NEAR(shares[pair.parameter], pair.width, 1e-6);
+        EXPECT_GT(std::abs(pair.width), design == EffectDesign::radial ? 0.09 : 0.35);
+      }
+    }
+    EXPECT_EQ(std::ssize(sets), plan.evaluationCount);
+    EXPECT_THAT(effects, ElementsAre(std::pair(0, 40), std::pair(1, 40), std::pair(2, 40), std::pair(3, 40)));
+    EXPECT_THAT(plan.unchanged, ElementsAre(0, 0, 0, 0, 40));
+    EXPECT_EQ(plan.evaluationCount, 40 * 5) << "no run for a step that changes nothing";
+  }
+}
+
+TEST(ElementaryEffects, OnLevelsHitAllOfThemAndTheTrajectoriesTakenAreMostDifferent) {
+  const SearchSpace space = spaceOf(3);
+  const ParameterDistributions distributions = ParameterDistributions::uniform(space);
+  const auto nearest = [&](std::int32_t candidates) {
+    const EffectPlan plan =
+        planEffects({.design = EffectDesign::trajectories, .trajectories = 12, .levels = 6, .candidates = candidates},
+                    space, distributions, 1);
+    std::vector<std::vector<double>> centroids;
+    std::set<double> values;
+    std::map<double, int> starts;
+    for (const EffectTrajectory& trajectory : plan.trajectories) {
+      for (const double u : trajectory.base) ++starts[u];
+      std::vector<double>& centroid = centroids.emplace_back(3);
+      for (const ParameterSet& set : setsOf(plan, trajectory, distributions)) {
+        for (std::size_t k = 0; k < 3; ++k) centroid[k] += set[k] / 4.0;
+        values.insert(set.begin(), set.end());
+      }
+    }
+    for (const auto& [value, count] : starts) EXPECT_EQ(count, 3 * 12 / 6) << value;
+    EXPECT_EQ(values.size(), 6U);
+    EXPECT_NEAR(*values.begin(), 1.0 / 12.0, 1e-12);
+    double least = 9.0;
+    for (std::size_t i = 0; i < centroids.size(); ++i) {
+      for (std::size_t j = 0; j < i; ++j) {
+        double squared = 0.0;
+        for (std::size_t k = 0; k < 3; ++k) squared += std::pow(centroids[i][k] - centroids[j][k], 2);
+        least = std::min(least, squared);
+      }
+    }
+    return least;
+  };
+  EXPECT_GT(nearest(500), 2.0 * nearest(1));
+}
+
+TEST(ElementaryEffects, OfALinearModelAreItsCoefficientsTimesTheRanges) {
+  const SearchSpace space = mixedSpace();
+  for (const EffectDesign design : kDesigns) {
+    const auto found = screen({.design = design, .trajectories = 10}, space, [](int, const auto& x) {
+      return resultOf(2.0 * x[0] - 3.0 * std::log(x[1]) + 5.0 * x[2] + 0.5 * x[3] + x[4]);
+    });
+    const double expected[] = {8.0, -6.0, 5.0, 5.0};
+    const OutputEffects& effects = found.outcome.outputs.at(0).effects;
+    for (std::size_t j = 0; j < 4; ++j) {
+      const ParameterEffects& p = effects.parameters[j];
+      EXPECT_NEAR(p.mu.value, expected[j], 1e-5) << j;
+      EXPECT_NEAR(p.muStar.value, std::abs(expected[j]), 1e-5);
+      EXPECT_NEAR(p.sigma.value, 0.0, 1e-5);
+      EXPECT_NEAR(p.muStar.upper - p.muStar.lower, 0.0, 1e-5);
+      EXPECT_EQ(p.verdict, ScreeningVerdict::keep);
+    }
+    EXPECT_EQ(effects.parameters[4].count, 0U);
+    EXPECT_EQ(effects.parameters[4].rank, 0U);
+  }
+}
+
+// Published implementations let a failed run's value into the indices.
+TEST(ElementaryEffects, AFailedRunCostsTheEffectsThatItIsPartOfAndNoMore) {
+  const SearchSpace space = spaceOf(20);
+  for (const EffectDesign design : kDesigns) {
+    const MorrisSettings settings{.design = design, .trajectories = 20, .bootstrapSamples = 100};
+    const auto evaluated = [&](const std::set<int>& failed) {
+      return screen(settings, space, [&](int number, const auto& x) {
+        return failed.contains(number) ? failedResult() : resultOf(testing::morrisFunction(x));
+      });
+    };
+    const Screening whole = evaluated({});
+    const EffectPlan& plan = whole.plan;
+    // In the middle, at the beginning and at the end of a trajectory of 21 sets.
+    for (const auto& [number, lost] : std::map<int, std::size_t>{{21 * 4 + 10, 2}, {21 * 5 + 1, 1}, {21 * 7, 1}}) {
+      const Screening holed = evaluated({number});
+      const bool isBase = number % 21 == 1;
+      const std::size_t expected = design == EffectDesign::trajectories ? lost : isBase ? 20 : 1;
+      EXPECT_EQ(holed.outcome.failedCount, 1U);
+      EXPECT_EQ(holed.outcome.lostEffects, expected);
+      EXPECT_EQ(holed.outcome.plannedEffects, 400U);
+      std::set<std::size_t> concerned;
+      for (const EffectPair& pair : pairsOf(plan, plan.trajectories[static_cast<std::size_t>((number - 1) / 21)])) {
+        if (pair.from == number || pair.to == number) concerned.insert(pair.parameter);
+      }
+      EXPECT_EQ(concerned.size(), expected);
+      for (std::size_t j = 0; j < 20; ++j) {
+        const ParameterEffects& one = whole.outcome.outputs[0].effects.parameters[j];
+        const ParameterEffects& other = holed.outcome.outputs[0].effects.parameters[j];
+        EXPECT_EQ(other.count, concerned.contains(j) ? 19U : 20U);
+        if (!concerned.contains(j)) {
+          EXPECT_EQ(other.muStar.value, one.muStar.value);
+          EXPECT_EQ(other.sigma.value, one.sigma.value);
+        }
+      }
+    }
+  }
+}
+
+TEST(ElementaryEffects, SetsThatCannotBeRunAreNotHandedOver) {
+  const SearchSpace space = spaceOf(3);
+  const Feasibility feasibility = feasibleWhere([](const auto& set) { return set[0] + set[1] < 1.4; }, "a + b < 1.4");
+  for (const EffectDesign design : kDesigns) {
+    const auto found = screen(
+        {.design = design, .trajectories = 20}, space,
+        [](int, const auto& x) {
+          EXPECT_LT(x[0] + x[1], 1.4);
+          return resultOf(x[0] + 2.0 * x[1] + x[2]);
+        },
+        feasibility);
+    const OutputEffects& effects = found.outcome.outputs[0].effects;
+    EXPECT_EQ(found.outcome.lostEffects, 0U);
+    for (std::size_t j = 0; j < 3; ++j) EXPECT_EQ(effects.parameters[j].count, 20U - found.plan.infeasible[j]);
+    EXPECT_NEAR(effects.parameters[1].mu.value, 2.0, 1e-6);
+    EXPECT_EQ(found.plan.infeasiblePoints > 0, design == EffectDesign::trajectories) << "radial ones look elsewhere";
+  }
+}
+
+class CountingEvaluator final : public Evaluator {
+ public:
+  std::vector<EvaluationResult> evaluateParameterSets(std::span<const ParameterSet> sets, DispatchMode) override {
+    largest = std::max(largest, sets.size());
+    if (++batches == 3) throw std::runtime_error("the third one");
+    std::vector<EvaluationResult> results;
+    for (const ParameterSet& set : sets) results.push_back(resultOf(set[0]));
+    return results;
+  }
+  std::size_t largest = 0;
+  int batches = 0;
+};
+
+TEST(ElementaryEffects, OfManyParametersAreEvaluatedInBatchesOfWholeTrajectories) {
+  const SearchSpace space = spaceOf(999);
+  const ParameterDistributions distributions = ParameterDistributions::uniform(space);
+  const EffectPlan plan = planEffects({.trajectories = 12}, space, distributions, 1);
+  CountingEvaluator evaluator;
+  EffectResults taken;
+  EXPECT_THROW(evaluateEffects(plan, distributions, evaluator, taken), std::runtime_error);
+  EXPECT_EQ(evaluator.largest, 5000U);
+  EXPECT_EQ(taken.size(), 10000U) << "those of complete batches are there";
+}
+
+TEST(EffectStatistics, AreThoseOfTheKnownEffects) {
+  const double nan = std::nan("");
+  const EffectRows effects{{1.0, 2.0, nan}, {-3.0, 2.0, nan}, {nan, 2.0, nan}, {5.0, 2.0, nan}};
+  const OutputEffects found = effectStatistics(effects, drawResamples(4, 100, 1), 0.1);
+  EXPECT_DOUBLE_EQ(found.parameters[0].mu.value, 1.0);
+  EXPECT_DOUBLE_EQ(found.parameters[0].muStar.value, 3.0);
+  EXPECT_DOUBLE_EQ(found.parameters[0].sigma.value, 4.0);
+  EXPECT_EQ(found.parameters[0].count, 3U);
+  EXPECT_FALSE(found.parameters[0].muStar.hasLimits()) << "of three effects";
+  EXPECT_EQ(found.parameters[0].verdict, ScreeningVerdict::none);
+  EXPECT_EQ(found.parameters[0].rank, 1U);
+  EXPECT_EQ(found.parameters[1].rank, 2U);
+  EXPECT_DOUBLE_EQ(found.parameters[1].share.value, 2.0 / 3.0);
+  EXPECT_EQ(found.parameters[2].rank, 0U);
+  EXPECT_TRUE(std::isnan(found.parameters[2].muStar.value));
+}
+
+/// Effects of mean 1 and a heavy tail, as absolute effects have: squares of normal deviates, nearly.
+double skewedEffect(UniformGenerator& random) {
+  return -std::log(random.next());
+}
+
+TEST(EffectStatistics, LimitsHoldNearlyAsOftenAsTheySay) {
+  constexpr std::size_t kParameters = 300;
+  UniformGenerator random(3);
+  for (const std::size_t r : {10U, 40U}) {
+    EffectRows effects(r, std::vector<double>(kParameters));
+    for (std::vector<double>& row : effects) {
+      for (double& effect : row) effect = skewedEffect(random);
+    }
+    const OutputEffects found = effectStatistics(effects, drawResamples(r, 400, 1), 0.1);
+    int holding = 0;
+    int ofSigma = 0;
+    for (const ParameterEffects& p : found.parameters) {
+      if (p.muStar.lower <= 1.0 && 1.0 <= p.muStar.upper) ++holding;
+      if (p.sigma.lower <= 1.0 && 1.0 <= p.sigma.upper) ++ofSigma;
+    }
+    // The percentile interval holds in 87 % of the cases with 10 effects.
+    EXPECT_NEAR(holding, 0.95 * kParameters, 0.03 * kParameters) << r;
+    EXPECT_GT(ofSigma, 0.86 * kParameters) << r;
+  }
+}
+
+TEST(EffectStatistics, TheVerdictIsOfTheLimitsAndNotOfTheValue) {
+  constexpr std::size_t kTrajectories = 20;
+  UniformGenerator random(5);
+  EffectRows effects(kTrajectories, std::vector<double>(5));
+  for (std::size_t t = 0; t < kTrajectories; ++t) {
+    const double skewed = skewedEffect(random);
+    effects[t] = {10.0 + random.next(), 0.8 * skewed * skewed, 0.1 * random.next(), 5.0, 0.0};
+  }
+  const OutputEffects found = effectStatistics(effects, drawResamples(kTrajectories, 1000, 1), 0.1);
+  const auto& p = found.parameters;
+  EXPECT_EQ(p[0].verdict, ScreeningVerdict::keep);
+  EXPECT_EQ(p[1].verdict, ScreeningVerdict::undecided);
+  EXPECT_EQ(p[2].verdict, ScreeningVerdict::fix);
+  EXPECT_EQ(p[3].verdict, ScreeningVerdict::keep);
+  EXPECT_EQ(p[4].verdict, ScreeningVerdict::fix);
+  EXPECT_GT(p[2].certainty, 0.99);
+  EXPECT_LT(p[3].certainty, 0.01);
+  EXPECT_GT(p[1].certainty, 0.01);
+  EXPECT_LT(p[1].certainty, 0.99);
+  EXPECT_GT(found.fixedTogether, 0.99);
+  EXPECT_GT(found.trajectoriesToDecide, static_cast<double>(kTrajectories));
+  EXPECT_EQ(p[0].rankStability, 1.0);
+  EXPECT_EQ(p[3].rank, 2U);
+}
+
+}  // namespace
+}  // namespace mirevo
