@@ -149,8 +149,7 @@ Coverage coverageOf(const Function& function, const MorrisSettings& settings, in
 }
 
 void printCoverage() {
-  const Function functions[] = {
-      {"Morris, 20", 20, testing::morrisFunction}, {"Ishigami, 3", 3, ishigami}, {"G, 8", 8, sobolG}};
+  const Function functions[] = {{"Morris, 20", 20, morrisFunction}, {"Ishigami, 3", 3, ishigami}, {"G, 8", 8, sobolG}};
   struct Case {
     const char* name;
     MorrisSettings settings;

@@ -1,8 +1,9 @@
 // What grows with the size of a run: time, processor time, peak memory and files of the built program.
 //
 //   scale FIGURE [FOLDER [COUNT]]   FIGURE is one of the names that it prints without arguments; FOLDER is where a
-//                                   folder for it is made (default: the temporary one). COUNT: of `bands` the model
-//                                   runs, of `report` the measures of each series, of `sensitivity` the parameters
+//                                   folder for it is made (default: the temporary one). COUNT: of `bands` and `glue`
+//                                   the model runs, of `report` the measures of each series, of `sensitivity` the
+//                                   parameters
 #include <cstdio>
 #include <cstdlib>
 #include <filesystem>
@@ -90,6 +91,38 @@ void bands(const std::string& folder, int count) {
   measureProgram(fmt::format("uncertainty of 4 parameters, {} runs of 87,600 values", runs), setup);
 }
 
+/// GLUE of a series of 365 values that differ from run to run, every run behavioural; then the same results with other
+/// weights, for which no model is run.
+void glue(const std::string& folder, int count) {
+  constexpr int kValues = 365;
+  const int runs = count > 0 ? count : 10'000;
+  const std::string measure =
+      itemCount(1) +
+      section("MEASURE_1", {"Name = 'm'\nStatistic_Type = 1\nFunction_Name = 'all'\n",
+                            section("SIMULATION_FILE", {"File_Name = 'base/simulated.csv'\nItem_No = 1\n"}),
+                            section("OBSERVATION_FILE", {"File_Name = 'observed.csv'\nItem_No = 1\n"})});
+  for (const int restart : {0, 1}) {
+    const std::string weights = fmt::format("Behavioural_Share = 1.0\nShape_Factor = {}\n", restart + 1);
+    const std::string setup = writeSetup(
+        folder, {.option = 3,
+                 .simulation = fmt::format("Report = 0\nRestart = {}\n", restart),
+                 .measures = measure,
+                 .task = section("UNCERTAINTY_ESTIMATION",
+                                 {fmt::format("Uncertainty_Type = 'GLUE'\nSample_Size = {}\nRandom_Seed = 1\n", runs),
+                                  section("GLUE", {weights})}),
+                 .model = "awk -F, 'NR == FNR { p[FNR] = $1; next } FNR == 1 { print; next } "
+                          "{ print $1 \",\" p[1] + $2 * p[2] }' parameters.txt input.csv > simulated.csv\n"});
+    if (restart == 0) {
+      for (const std::string file : {"/base/input.csv", "/base/simulated.csv", "/observed.csv"}) {
+        writeHourlySeries(folder + file, 1, kValues);
+      }
+    }
+    measureProgram(fmt::format("GLUE of 4 parameters, {} runs of {} values{}", runs, kValues,
+                               restart == 0 ? "" : ", weighed again from their results"),
+                   setup);
+  }
+}
+
 /// A sensitivity analysis with covariance: every value depends on two of the parameters.
 void sensitivity(const std::string& folder, int count) {
   const int parameters = count > 0 ? count : 2000;
@@ -127,9 +160,15 @@ struct Figure {
   void (*measure)(const std::string& folder, int count);
 };
 
-constexpr Figure kFigures[] = {
-    {"restart", restart}, {"uncertainty", uncertainty}, {"series", series},       {"report", report},
-    {"bands", bands},     {"sensitivity", sensitivity}, {"surrogate", surrogate}, {"covariance", covariance}};
+constexpr Figure kFigures[] = {{"restart", restart},
+                               {"uncertainty", uncertainty},
+                               {"series", series},
+                               {"report", report},
+                               {"bands", bands},
+                               {"glue", glue},
+                               {"sensitivity", sensitivity},
+                               {"surrogate", surrogate},
+                               {"covariance", covariance}};
 
 }  // namespace
 

@@ -34,7 +34,8 @@ agree 'Discharge RMSE in 1991 to 2000' "$2" 3653 1991-01-01 2000-12-31
 cp "$3"/sensitivity.kdx "$3"/scenarios.kdx "$folder"
 sed 's/Trajectories = .*/Trajectories = 10/' "$3/morris.kdx" >"$folder/morris.kdx"
 sed 's/Sample_Size      = .*/Sample_Size      = 20/' "$3/uncertainty.kdx" >"$folder/uncertainty.kdx"
-for task in sensitivity morris scenarios uncertainty; do
+sed 's/Sample_Size      = 2048/Sample_Size      = 32/' "$3/glue.kdx" >"$folder/glue.kdx"
+for task in sensitivity morris scenarios uncertainty glue; do
   VOLK_PROGRESS=NONE "$1" "$folder/$task.kdx" || { cat "$folder/$task.log"; exit 1; }
 done
 grep -q '^# *1\. X4 ' "$folder/sensitivity_Sensitivity.dat"
@@ -42,3 +43,12 @@ grep -q '^objective	Discharge	X4	' "$folder/morris_Morris.dat"
 grep -q '^# Standard error of a residual: 11\.7' "$folder/sensitivity_Sensitivity.dat"
 awk -F '\t' '$1 == 2 { found = $9 > 11.7 && $9 < 11.8 } END { exit !found }' "$folder/scenarios.dat"
 test "$(wc -l <"$folder/uncertainty_Band_1.csv")" -eq 3289
+# A band over the years of calibration and the ten that follow.
+test "$(wc -l <"$folder/glue_Band_1.csv")" -eq 7034
+grep -q '^# Band of NSE in 1991 to 2000 (validation): [1-9][0-9.]* % of 3653 observations lie ' "$folder/glue.dat"
+
+# A few blocks of the Sobol' analysis: 256 model runs.
+sed 's/Sample_Size    = .*/Sample_Size    = 32/' "$3/sobol.kdx" >"$folder/sobol.kdx"
+VOLK_PROGRESS=NONE "$1" "$folder/sobol.kdx" || { cat "$folder/sobol.log"; exit 1; }
+test "$(grep -c '^objective	Discharge	.*	total	' "$folder/sobol_Sobol.dat")" -eq 6
+test "$(wc -l <"$folder/sobol_SobolSeries_1.csv")" -eq 3289

@@ -47,11 +47,11 @@ inline constexpr RunFile kScenarioSeries{"_ScenarioSeries", ".dat"};
 inline constexpr RunFile kReport{
     .stem = "_Report", .extension = ".html", .mark = "content=\"default-src 'none'; script-src"};
 inline constexpr RunFile kBand{.stem = "_Band_", .extension = ".csv", .isNumbered = true, .mark = "# Band of "};
+inline constexpr RunFile kSobolSeries{
+    .stem = "_SobolSeries_", .extension = ".csv", .isNumbered = true, .mark = "# Sobol' indices of "};
 /// Beside a band of the simulated values: that of what would be observed, with the errors.
 inline constexpr RunFile kTotalBand{
     .stem = "_TotalBand_", .extension = ".csv", .isNumbered = true, .mark = "# Band of "};
-inline constexpr RunFile kSobolSeries{
-    .stem = "_SobolSeries_", .extension = ".csv", .isNumbered = true, .mark = "# Sobol' indices of "};
 inline constexpr RunFile kSavedFolder{"_Saved", ""};
 /// These two stand beside the setup, or in the folder that it names for them.
 inline constexpr RunFile kFailedFolder{"_Failed", "", true};
@@ -77,8 +77,10 @@ inline constexpr RunFile kChains{"_Chains", ".dat", false, true};
 inline constexpr RunFile kPosterior{"_Posterior", ".dat", false, true};
 inline constexpr RunFile kMarginals{"_Marginals", ".dat", false, true};
 inline constexpr RunFile kConvergence{"_Convergence", ".dat", false, true};
-inline constexpr std::array kUncertaintyTables{kQuantiles, kSampleCorrelation, kChains,
-                                               kPosterior, kMarginals,         kConvergence};
+inline constexpr RunFile kSampleSensitivities{"_SampleSensitivities", ".dat", false, true};
+inline constexpr RunFile kGlue{"_Glue", ".dat", false, true};
+inline constexpr std::array kUncertaintyTables{kQuantiles, kSampleCorrelation, kSampleSensitivities, kGlue,
+                                               kChains,    kPosterior,         kMarginals,           kConvergence};
 inline constexpr RunFile kSobol{"_Sobol", ".dat", false, true};
 inline constexpr RunFile kSobolConvergence{"_SobolConvergence", ".dat", false, true};
 inline constexpr std::array kSensitivityTables{kCovariance,    kCorrelation, kParameterLimits, kJacobian,

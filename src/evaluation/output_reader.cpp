@@ -122,9 +122,11 @@ void OutputReader::prepareValidation() {
     made.measure.selection.end.reset();
     if (!description_.isForRuns) continue;
     try {
-      const ObservedSeries observed =
+      ObservedSeries observed =
           readObservedSeries(i, made.measure, made.period, SeriesPrecision::single, series_.observation(i));
-      if (!observed.values.empty()) continue;
+      const bool isEmpty = observed.values.empty();
+      if (!isEmpty && description_.keepSimulatedValues) validationObservations_.push_back({k, std::move(observed)});
+      if (!isEmpty) continue;
     } catch (const FatalError& error) {  // such as a weight that cannot be one
       warnings_.push_back(fmt::format("{}\nThe measure has no value in the validation period {}",
                                       error.message() + "\n" + error.detail(), quotedForMessage(period.name)));

@@ -60,6 +60,8 @@ class OutputReader final {
   /// The observations of every measure of interface type 0, with the steps of its simulated series if values are kept
   /// there; empty unless simulated values are kept.
   const std::vector<ObservedSeries>& observedSeries() const { return observedSeries_; }
+  /// Their observations in validation periods, on which nothing depends; empty unless simulated values are kept.
+  const std::vector<ValidationObservations>& validationObservations() const { return validationObservations_; }
   /// The measures whose simulated series a result may hold, 0-based: one per pair of series that is compared. Series
   /// that are shown begin and end with the first and the last of the evaluation and validation periods.
   const std::vector<std::size_t>& shownMeasures() const { return shownMeasures_; }
@@ -109,6 +111,7 @@ class OutputReader final {
   std::vector<std::uintmax_t> usualNumbers_;  ///< sizes of these files as they were found at the start
   bool hasToldDoubts_ = false;                ///< what the instructions read of a listing and may not mean
   std::vector<ObservedSeries> observedSeries_;
+  std::vector<ValidationObservations> validationObservations_;
   RunStandard standard_;
 };
 

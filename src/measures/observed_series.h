@@ -20,6 +20,12 @@ struct ObservedSeries {
   std::vector<double> weights = {};  ///< one per time; empty: each 1
 };
 
+/// Those of a validation period.
+struct ValidationObservations {
+  std::size_t period = 0;  ///< 0-based
+  ObservedSeries observed;
+};
+
 /// The period includes both ends. Throws FatalError if the item cannot be read.
 ObservedSeries readObservedSeries(std::size_t index, const OutputMeasure& measure, const EvaluationPeriod& period,
                                   SeriesPrecision precision, TimeSeriesObject& observation);

@@ -112,11 +112,16 @@ std::optional<ReportedBand> readBand(const std::string& path, std::optional<int>
     band.mostRuns = std::max(band.mostRuns, count);
     if (count > 0 && (band.fewestRuns == 0 || count < band.fewestRuns)) band.fewestRuns = count;
   }
+  CoverageCount coverage;
   for (std::size_t i = 0; i < band.seconds.size(); ++i) {
     if (!std::isfinite(band.observed[i]) || !std::isfinite(band.median[i])) continue;
-    ++band.observationCount;
+    coverage.add(band.observed[i], band.lower[i], band.upper[i]);
     if (band.observed[i] >= band.lower[i] && band.observed[i] <= band.upper[i]) ++band.insideCount;
   }
+  const BandCoverage found = coverage.found();
+  band.observationCount = found.observationCount;
+  band.meanWidth = found.meanWidth;
+  band.relativeWidth = found.relativeWidth;
   return band;
 }
 

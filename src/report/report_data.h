@@ -9,6 +9,7 @@
 
 #include "evaluation/evaluation_result.h"
 #include "report/failure_reasons.h"
+#include "report/report_glue.h"
 #include "report/report_morris.h"
 #include "report/report_sobol.h"
 #include "report/series_above.h"
@@ -108,8 +109,10 @@ struct ReportedBand {
   std::vector<float> runs;  ///< how many are behind the quantiles of each time; empty where the file does not say it
   std::size_t observationCount = 0;  ///< observations with a simulated value
   std::size_t insideCount = 0;       ///< those inside the band
-  int fewestRuns = 0;                ///< of the times with a band
-  int mostRuns = 0;                  ///< where the file does not say it, the runs that succeeded
+  double meanWidth = 0.0;            ///< BandCoverage, at the observations; likewise
+  double relativeWidth = 0.0;
+  int fewestRuns = 0;  ///< of the times with a band
+  int mostRuns = 0;    ///< where the file does not say it, the runs that succeeded
 };
 
 /// A parameter without a variance, and why.
@@ -143,6 +146,24 @@ struct ReportedSensitivity {
   bool hasBetterFit = false;     ///< another set fits better than that of the analysis
   std::vector<int> ofOtherSets;  ///< evaluations that are left out, as the setup has other sets for them
   std::optional<ReportedCovariance> covariance;
+};
+
+/// The distribution from which the values of a variable parameter were drawn.
+struct ReportedDistribution {
+  std::string text;               ///< "triangular, from 1 to 5, mode 2"
+  std::vector<double> quantiles;  ///< at equal steps of the probability from half a step on, on the model scale
+};
+
+/// What a sample tells of its parameters, see algorithms/analyses/sample_sensitivity.
+struct ReportedSampleSensitivity {
+  std::vector<std::string> parameters;
+  std::vector<std::string> outputs;
+  std::vector<std::string> kinds;                     ///< of the outputs, "measure" or "objective"
+  std::vector<std::vector<double>> rankCorrelations;  ///< a row of each parameter, a column of each output
+  std::vector<std::vector<double>> firstOrder;
+  std::vector<std::vector<double>> lower;
+  std::vector<std::vector<double>> upper;
+  bool areCorrelated = false;  ///< the parameters
 };
 
 /// The evaluation period or a validation period.
@@ -183,6 +204,9 @@ struct ReportData {
   std::optional<ReportedSensitivity> sensitivity;
   std::vector<ReportedScreening> morris;
   std::optional<ReportedSobol> sobol;
+  std::optional<ReportedGlue> glue;
+  std::vector<ReportedDistribution> distributions;  ///< one per variable parameter, or none at all
+  std::optional<ReportedSampleSensitivity> sampleSensitivity;
   std::vector<std::string> summary;  ///< the closing lines of the result file
 };
 

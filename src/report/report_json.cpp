@@ -11,6 +11,7 @@
 #include "report/drawn_lines.h"
 #include "report/hydrograph_views.h"
 #include "report/json_writer.h"
+#include "report/report_sample.h"
 #include "report/report_validation.h"
 #include "report/thinning.h"
 
@@ -307,7 +308,8 @@ void writeBands(JsonWriter& json, const ReportData& data) {
     json.key("observed").numbers(band.observed, Digits::drawn).key("p5").numbers(band.lower, Digits::drawn);
     json.key("p50").numbers(band.median, Digits::drawn).key("p95").numbers(band.upper, Digits::drawn);
     json.member("inside", static_cast<double>(band.insideCount) / static_cast<double>(band.observationCount));
-    json.member("n", band.observationCount);
+    json.member("n", band.observationCount).member("width", band.meanWidth);
+    json.member("relativeWidth", band.relativeWidth);
     writeGaps(json, "gaps", {band.seconds, band.median}, {whole.seconds, whole.median});
     writeGaps(json, "observedGaps", {band.seconds, band.observed}, {whole.seconds, whole.observed});
     if (!band.runs.empty()) json.key("runs").numbers(band.runs, Digits::drawn);
@@ -377,6 +379,8 @@ std::string reportJson(const ReportData& data) {
   if (data.sensitivity) writeSensitivity(json, *data.sensitivity);
   if (!data.morris.empty()) writeMorris(json, data.morris);
   if (data.sobol) writeSobol(json, *data.sobol);
+  if (data.glue) writeGlue(json, *data.glue);
+  writeSample(json, data);
   json.member("summary", data.summary).endObject();
   return json.take();
 }

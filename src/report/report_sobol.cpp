@@ -89,7 +89,7 @@ bool takeIndices(const ReadTable& table, ReportedSobol& sobol) {
       const std::size_t with = factorAt(sobol.factors, cells[at[3]]);
       const std::size_t count = sobol.factors.size();
       output.second.resize(count, std::vector<double>(count, kNaN));
-      output.second[factor][with] = index.value;
+      output.second[factor][with] = output.second[with][factor] = index.value;
     }
   }
   const std::size_t count = sobol.factors.size();

@@ -29,7 +29,7 @@ struct ReportedSobolOutput {
   std::vector<ReportedSobolIndex> total;
   std::vector<ReportedSobolIndex> interactions;
   ReportedSobolIndex sumOfFirst;
-  /// Of each two factors; empty without second order, NaN on and below the diagonal.
+  /// Of each two factors; empty without second order, symmetric, with NaN on the diagonal.
   std::vector<std::vector<double>> second;
   std::vector<std::int64_t> stageRows;                  ///< sizes of the sample
   std::vector<std::vector<ReportedSobolIndex>> stages;  ///< total indices: one row per size

@@ -32,6 +32,7 @@
 #include "report/report_analyses.h"
 #include "report/report_file.h"
 #include "report/report_parameters.h"
+#include "report/report_sample.h"
 #include "report/report_validation.h"
 #include "report/run_sources.h"
 #include "run/results/restart_settings.h"
@@ -476,6 +477,17 @@ void ReportBuilder::addAnalyses() {
     std::vector<std::string> faults;
     data_.sobol = reportedSobol(config_, filePrefix_, pairLabels(), faults);
     for (const std::string& fault : faults) note(fault + ".");
+  }
+  if (task.isGlue && hasAnalysis) {
+    std::string fault;
+    data_.glue = reportedGlue(filePrefix_, config_.parameters, fault);
+    if (!fault.empty()) note(fmt::format("The weights of GLUE are not shown: {}.", fault));
+  }
+  if (task.distributions != nullptr) data_.distributions = reportedDistributions(*task.distributions, space());
+  if (task.distributions != nullptr && hasAnalysis) {
+    std::string fault;
+    data_.sampleSensitivity = reportedSampleSensitivity(filePrefix_, space().names, fault);
+    if (!fault.empty()) note(fault + ".");
   }
   if (task.sensitivity != nullptr) {
     data_.sensitivity = reportedSensitivity(config_, *task.sensitivity, space(), sources_.results.rows, pairsOfRuns());

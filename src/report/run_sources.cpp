@@ -97,7 +97,9 @@ std::optional<RunSources> readRunSources(const RunConfig& config, const SearchSp
   sources.setup = setupNamedIn(*text);
   sources.isOfOtherSetup = !sources.setup.empty() && !isSameSetup(sources.setup, config.setupFile);
   sources.results = readResultTable(*text, resultColumns(config, space));
-  if (sources.results.rows.empty() && sources.results.rowsOfOtherColumns == 0) {
+  // GLUE of an earlier run makes no evaluation.
+  const bool mayHaveNone = config.task->report().isGlue && config.plannedEvaluations() == 0;
+  if (sources.results.rows.empty() && sources.results.rowsOfOtherColumns == 0 && !mayHaveNone) {
     reason = sources.isOfOtherSetup ? ofAnotherSetup(path, sources.setup)
                                     : path + ": it holds no evaluation, so there is nothing to report";
     return std::nullopt;

@@ -28,6 +28,7 @@
 #include "platform/terminal/front_end.h"
 #include "report/run_report.h"
 #include "run/job_end.h"
+#include "run/results/earlier_sample_file.h"
 #include "run/results/record_file.h"
 #include "run/results/shared_files.h"
 #include "run/run_findings.h"
@@ -344,7 +345,11 @@ TaskContext RunDriver::taskContext() {
           [this](std::span<const int> numbers, std::size_t first, std::size_t count) {
             return results_->simulatedValues()->columns(numbers, first, count);
           },
-          config_.validationPeriods};
+          config_.validationPeriods,
+          [this](const std::string& file) {
+            return readEarlierSample(file, config_, parameters_->searchSpace(), runner_->output().observedSeries());
+          },
+          runner_->output().validationObservations()};
 }
 
 const TaskOutcome& RunDriver::runTask() {
@@ -438,7 +443,8 @@ std::optional<RunDriver::Unwritten> RunDriver::closeResults(const Ending& ending
 }
 
 void RunDriver::reportRun() {
-  if (!config_.writesReport || !reporter_ || reporter_->evaluationCount() == 0) return;
+  const bool hasTables = outcome_ && !outcome_->tables.empty();
+  if (!config_.writesReport || !reporter_ || (reporter_->evaluationCount() == 0 && !hasTables)) return;
   std::string reason;
   if (!writeReport(config_, filePrefix_, reason)) {
     state_.log.warning("The report cannot be written: " + reason);
@@ -496,7 +502,7 @@ void RunDriver::finish(const TaskOutcome& outcome) {
     showMessage(fmt::format("Warning: The end of {} may be missing: {}", state_.log.path(), state_.log.writeError()));
   }
   endProgress(kNormalTermination);
-  if (count == 0) {
+  if (count == 0 && outcome.tables.empty()) {
     showMessage("Nothing was run: the setup selects no task or no search", {}, MessageType::warning);
   }
   tellOfBestThatDiffers();

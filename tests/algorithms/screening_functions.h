@@ -5,7 +5,7 @@
 #include <span>
 #include <vector>
 
-namespace mirevo::testing {
+namespace mirevo {
 
 /// The function of 20 factors of Morris (1991), doi:10.1080/00401706.1991.10484804, on the unit cube: factors 1 to 7
 /// have effects that are not linear or interact, 8 to 10 linear ones, 11 to 20 hardly any. There the coefficients that
@@ -33,4 +33,4 @@ inline double morrisFunction(std::span<const double> x) {
   return y + 5.0 * w[0] * w[1] * w[2] * w[3];
 }
 
-}  // namespace mirevo::testing
+}  // namespace mirevo

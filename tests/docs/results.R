@@ -11,6 +11,7 @@ stopifnot(
   names(band) == c("time", "observed", "5 %", "50 %", "95 %"), nrow(band) == 730, !is.na(days),
   is.numeric(sensitivity$Composite), is.numeric(as.matrix(covariance)), is.numeric(as.matrix(correlation)),
   is.numeric(as.matrix(drawn)), rownames(covariance) == c("delay", "loss"),
+  screening$MuStarLower <= screening$MuStarUpper, screening$Effects == 30, is.numeric(screening$Certainty),
   limits$Lower95 < limits$Upper95, nrow(jacobian) == 730, is.numeric(jacobian$delay),
   quantiles[["5 %"]] <= quantiles[["95 %"]],
   nrow(failures) > 0, failures$Kind == "exitCode", failures$Output == "too dry \\x23 again\\n",

@@ -93,15 +93,9 @@ class Planner {
 };
 
 bool Planner::isCorrelated() const {
-  std::vector<double> point(size(), 0.5);
-  const ParameterSet base = distributions_.setAt(point);
-  for (std::size_t j = 0; j < size(); ++j) {
-    point[j] = 0.9;
-    const ParameterSet moved = distributions_.setAt(point);
-    point[j] = 0.5;
-    for (std::size_t k = 0; k < size(); ++k) {
-      if (k != j && moved[k] != base[k]) return true;
-    }
+  const auto& copula = distributions_.copula();
+  for (std::size_t j = 0; copula && j < size(); ++j) {
+    if (copula->isCorrelated(j)) return true;
   }
   return false;
 }
@@ -177,7 +171,9 @@ void Planner::stepFromBase(EffectTrajectory& trajectory, std::size_t j, double t
   for (int i = 0; i < kMostTries; ++i) {
     double u = target + i * kGoldenRatio;
     u -= std::floor(u);
-    trajectory.moved[j] = awayFrom(trajectory.base[j], u, kLeastStep);
+    // A value that only short steps lead to is better than none.
+    const double least = wasChanged || i < kMostTries / 2 ? kLeastStep : 0.0;
+    trajectory.moved[j] = awayFrom(trajectory.base[j], u, least);
     const double width = widthOf(j, trajectory.base, trajectory.moved[j]);
     if (width == 0.0) continue;
     wasChanged = true;

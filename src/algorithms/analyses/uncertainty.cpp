@@ -159,14 +159,10 @@ std::vector<ParameterSet> uncertaintySample(const UncertaintySettings& settings,
   return drawSample(settings, random, messages);
 }
 
-FeasibleSample feasibleUncertaintySample(const UncertaintySettings& settings, std::int32_t seed,
-                                         const Feasibility& feasibility, const MessageSink& messages) {
-  UniformGenerator random(seed);
-  FeasibleSample sample{drawSample(settings, random, messages)};
+FeasibleSample redrawInfeasible(std::vector<ParameterSet> sets, const Feasibility& feasibility,
+                                const std::function<ParameterSet()>& drawOne) {
+  FeasibleSample sample{std::move(sets)};
   sample.drawnCount = static_cast<std::int64_t>(sample.sets.size());
-  UncertaintySettings single = settings;
-  single.samplingType = SamplingType::simpleRandom;
-  single.sampleSize = 1;
   const std::int64_t most = kMostRedraws + kMostRedraws / 1000 * sample.drawnCount;
   std::int64_t redraws = 0;
   std::size_t feasible = 0;
@@ -175,12 +171,22 @@ FeasibleSample feasibleUncertaintySample(const UncertaintySettings& settings, st
       if (redraws++ == most) {
         failRedrawing(feasibility, feasible, sample, *violation);
       }
-      set = std::move(drawSample(single, random, messages).front());
+      set = drawOne();
       ++sample.drawnCount;
     }
     ++feasible;
   }
   return sample;
+}
+
+FeasibleSample feasibleUncertaintySample(const UncertaintySettings& settings, std::int32_t seed,
+                                         const Feasibility& feasibility, const MessageSink& messages) {
+  UniformGenerator random(seed);
+  UncertaintySettings single = settings;
+  single.samplingType = SamplingType::simpleRandom;
+  single.sampleSize = 1;
+  return redrawInfeasible(drawSample(settings, random, messages), feasibility,
+                          [&] { return std::move(drawSample(single, random, messages).front()); });
 }
 
 UncertaintyOutcome uncertaintyAnalysis(std::vector<ParameterSet> sample, Evaluator& evaluator) {

@@ -24,7 +24,7 @@ namespace mirevo {
 enum class SamplingType : std::int32_t { simpleRandom = 0, latinHypercube = 1 };
 /// The forms of the uncertainty analysis; those that do not sample independently have a name only.
 inline constexpr CodeName kSamplingTypeNames[] = {
-    {0, "simple random"}, {1, "Latin hypercube"}, {std::nullopt, "DREAM"}};
+    {0, "simple random"}, {1, "Latin hypercube"}, {std::nullopt, "GLUE"}, {std::nullopt, "DREAM"}};
 
 /// At which times the bands of simulated series are made. Without codes: names only, in the order of the enumerators.
 enum class BandTimes : std::int32_t { observations, steps };
@@ -70,6 +70,11 @@ struct FeasibleSample {
   std::vector<ParameterSet> sets;
   std::int64_t drawnCount = 0;  ///< sets that were drawn for it
 };
+
+/// The sets, of which those that cannot be run are replaced by what `drawOne` makes, one after another. Throws as
+/// feasibleUncertaintySample().
+FeasibleSample redrawInfeasible(std::vector<ParameterSet> sets, const Feasibility& feasibility,
+                                const std::function<ParameterSet()>& drawOne);
 
 /// The uncertaintySample() whose sets that cannot be run are replaced by further ones: the stream goes on behind the
 /// sample, with one deviate for each parameter in setup order, whatever the type of sampling. Throws FatalError "Error:

@@ -178,12 +178,35 @@ export interface Band extends Times {
   p95: Maybe[];
   inside: Maybe; // share of the observed values within p5 to p95
   n: Maybe;
+  width?: Maybe; // mean at the observed values
+  relativeWidth?: Maybe; // over the standard deviation of the observed values
   gaps?: number[]; // places before which there is a gap, over which no line is drawn
   observedGaps?: number[];
   runs?: Maybe[]; // how many are behind the quantiles of each time
   fewestRuns?: number;
   mostRuns?: number; // without `runs`: the runs that succeeded
   thinned?: boolean; // reduced to the extremes of short spans; `inside` and `n` are of all values
+}
+
+/** Weights of acceptable sets. Those with a dot are thinned, shares are of all. */
+export interface Glue {
+  choices: string[]; // what is behavioural, and the likelihood
+  succeeded: number;
+  behavioural: number;
+  effective: Maybe; // sets of equal weight that tell as much
+  distanceLimit: Maybe;
+  numbers: number[]; // evaluations with a dot
+  weights: Maybe[];
+  judged: Maybe[];
+  parameters: {
+    name: string;
+    logarithmic: boolean;
+    distance: Maybe; // of the behavioural distribution from that of all sets
+    values: Maybe[]; // of the sets with a dot
+    edges: number[]; // of the bins
+    drawn: number[]; // share of the sets that succeeded, per bin
+    weighed: number[]; // share of the weight
+  }[];
 }
 
 export interface Covariance {
@@ -249,7 +272,7 @@ export interface SobolOutput {
   total: SobolIndex[];
   interactions: SobolIndex[];
   sumOfFirst: SobolIndex[]; // one
-  second: Maybe[][]; // of each two factors, above the diagonal; empty where it was not asked for
+  second: Maybe[][]; // of each two factors; empty where it was not asked for
   rows: number[]; // sizes of the sample
   stages: { total: SobolIndex[] }[]; // one per size
 }
@@ -274,6 +297,23 @@ export interface Sobol {
   series: SobolSeries[];
 }
 
+/** From which the values of a variable parameter were drawn. */
+export interface Distribution {
+  text: string;
+  quantiles: Maybe[]; // at equal steps of the probability from half a step on
+}
+
+export interface SampleSensitivity {
+  parameters: string[];
+  outputs: string[];
+  kinds: string[]; // of the outputs, 'measure' or 'objective'
+  rankCorrelations: Maybe[][]; // one row per parameter, one column per output
+  firstOrder: Maybe[][];
+  lower: Maybe[][]; // 95 % limits
+  upper: Maybe[][];
+  areCorrelated: boolean; // the parameters
+}
+
 export interface ReportData {
   format: number;
   program: string;
@@ -293,6 +333,9 @@ export interface ReportData {
   sensitivity: Sensitivity | null;
   morris: Screening[];
   sobol?: Sobol | null;
+  glue?: Glue | null;
+  distributions?: Distribution[]; // one per variable parameter, or none
+  sampleSensitivity?: SampleSensitivity | null;
   summary: string[];
 }
 

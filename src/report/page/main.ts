@@ -5,10 +5,12 @@ import { make } from './dom';
 import { nameFilesAfter } from './figure_files';
 import { switchTheme } from './look';
 import { comparisonSection } from './sections/comparisons';
+import { glueSection } from './sections/glue';
 import { historySection } from './sections/histories';
 import { morrisSection } from './sections/morris';
 import { failureSection, head, parameterSection, resultSection, runSection, summarySection } from './sections/overview';
 import { dottySection, goodSetsSection, progressSection } from './sections/search';
+import { sampleSection } from './sections/sample';
 import type { Section } from './sections/section';
 import { sensitivitySection } from './sections/sensitivity';
 import { seriesSection } from './sections/series';
@@ -21,9 +23,11 @@ function sections(data: ReportData): Section[] {
   const sampled = task !== 'sensitivity' || data.sobol; // a local analysis varies one parameter at a time
   const all = [
     bandSection(data),
+    glueSection(data),
     sensitivitySection(data),
     morrisSection(data),
     sobolSection(data),
+    sampleSection(data),
     validationSection(data),
     seriesSection(data),
     parameterSection(data),

@@ -52,13 +52,22 @@ RecordFile::~RecordFile() {
 }
 
 void RecordFile::open(const std::string& path) {
-  openWith(path, O_CREAT | O_TRUNC | O_APPEND);
+  openWith(path, O_RDWR | O_NOFOLLOW | O_CREAT | O_TRUNC | O_APPEND);
 }
 
 void RecordFile::openToContinue(const std::string& path) {
-  openWith(path, O_APPEND);
+  openWith(path, O_RDWR | O_NOFOLLOW | O_APPEND);
+  takeSize();
+}
+
+void RecordFile::openToRead(const std::string& path) {
+  openWith(path, O_RDONLY);
+  takeSize();
+}
+
+void RecordFile::takeSize() {
   struct stat status {};
-  if (::fstat(descriptor_, &status) != 0) fatalError("Error: Unable to open " + path, std::strerror(errno));
+  if (::fstat(descriptor_, &status) != 0) fatalError("Error: Unable to open " + path_, std::strerror(errno));
   size_ = status.st_size;
 }
 
@@ -75,7 +84,7 @@ void RecordFile::openWith(const std::string& path, int flags) {
   path_ = path;
   size_ = 0;
   failed_ = false;
-  descriptor_ = ::open(path.c_str(), O_RDWR | O_CLOEXEC | O_NOFOLLOW | flags, 0666);
+  descriptor_ = ::open(path.c_str(), O_CLOEXEC | flags, 0666);
   if (descriptor_ < 0) fatalError("Error: Unable to open " + path, std::strerror(errno));
 }
 

@@ -28,6 +28,9 @@ class RecordFile final {
   /// The same after making `content` the file's, as a whole, unless it is already. Throws FatalError.
   void openToContinue(const std::string& path, const std::string& content);
 
+  /// Opens the file to read from it alone. Throws FatalError with the system's reason.
+  void openToRead(const std::string& path);
+
   /// Appends `record` unchanged, line ends included. Throws FatalError with the system's reason, once: after a failure
   /// further records are dropped. False for one that is.
   bool append(std::string_view record);
@@ -63,6 +66,7 @@ class RecordFile final {
   bool takeUpSize(struct stat status, std::string& reason);
   bool endsLine() const;
   void openWith(const std::string& path, int flags);
+  void takeSize();
 
   std::string path_;
   int descriptor_ = -1;

@@ -1,7 +1,6 @@
 #include "run/results/run_results.h"
 
 #include <algorithm>
-#include <array>
 #include <filesystem>
 #include <set>
 #include <system_error>
@@ -44,12 +43,10 @@ const ResultFileNames& namesOf(const RunConfig& config) {
   return config.task ? config.task->facts().resultFiles : run_files::kPlain;
 }
 
-/// The files of series that analyses write, a number each: bands, or Sobol' indices.
-std::span<const RunFile> seriesFilesOf(const ResultFileNames& names) {
-  static constexpr std::array kOfSensitivity{run_files::kSobolSeries};
-  static constexpr std::array kOfUncertainty{run_files::kBand, run_files::kTotalBand};
-  if (names.results == run_files::kSensitivity.results) return kOfSensitivity;
-  return kOfUncertainty;
+/// The files of series that analyses write, a number each: bands, or Sobol' indices. All of a task have the same mark.
+std::vector<RunFile> seriesFilesOf(const ResultFileNames& names) {
+  if (names.results == run_files::kSensitivity.results) return {run_files::kSobolSeries};
+  return {run_files::kBand, run_files::kTotalBand};
 }
 
 }  // namespace

@@ -135,18 +135,11 @@ void SimulatedValuesFile::addRowsToChecksums(const ResultRows& rows) const {
   if (!replaceFile(path_, bytes, reason)) fatalError("Error: Unable to write to " + path_, reason);
 }
 
-std::map<int, KeptValues> SimulatedValuesFile::takeUp(const ResultRows& rows) {
-  addRowsToChecksums(rows);
-  const std::string expected = head();
-  if (readFileIfThere(path_, expected.size()) != expected) {
-    create();
-    return {};
-  }
-  file_.openToContinue(path_);
+std::int64_t SimulatedValuesFile::walkRecords(const ResultRows& rows,
+                                              const std::function<void(int number, const char* values)>& take) {
   offsets_.clear();
-  std::map<int, KeptValues> found;
   std::string record(recordLength(), '\0');
-  auto offset = static_cast<std::int64_t>(expected.size());
+  auto offset = static_cast<std::int64_t>(head().size());
   const auto length = static_cast<std::int64_t>(record.size());
   for (; offset + length <= file_.size(); offset += length) {
     read(offset, record.data(), record.size());
@@ -156,19 +149,39 @@ std::map<int, KeptValues> SimulatedValuesFile::takeUp(const ResultRows& rows) {
         checksumWithRow(content, row->parameters, row->measures) != numberAt<std::uint64_t>(record, contentLength())) {
       continue;
     }
-    const int number = row->number;
-    KeptValues values{std::vector<double>(valueCount_), std::vector<double>(exactMeasureCount_)};
-    const char* from = record.data() + sizeof(std::int64_t);
-    for (std::vector<double>* const part : {&values.simulatedValues, &values.exactMeasures}) {
-      if (!part->empty()) std::memcpy(part->data(), from, part->size() * sizeof(double));
-      from += part->size() * sizeof(double);
-    }
-    if (isReadBack_) values.simulatedValues = std::vector<double>();
-    found.insert_or_assign(number, std::move(values));
-    noteOffset(number, offset);
+    take(row->number, record.data() + sizeof(std::int64_t));
+    noteOffset(row->number, offset);
   }
-  if (offset < file_.size()) file_.cutTo(offset);
+  return offset;
+}
+
+std::map<int, KeptValues> SimulatedValuesFile::takeUp(const ResultRows& rows) {
+  addRowsToChecksums(rows);
+  const std::string expected = head();
+  if (readFileIfThere(path_, expected.size()) != expected) {
+    create();
+    return {};
+  }
+  file_.openToContinue(path_);
+  std::map<int, KeptValues> found;
+  const std::int64_t end = walkRecords(rows, [&](int number, const char* from) {
+    KeptValues values{std::vector<double>(isReadBack_ ? 0 : valueCount_), std::vector<double>(exactMeasureCount_)};
+    if (!values.simulatedValues.empty()) std::memcpy(values.simulatedValues.data(), from, valueCount_ * sizeof(double));
+    from += valueCount_ * sizeof(double);
+    if (exactMeasureCount_ > 0) std::memcpy(values.exactMeasures.data(), from, exactMeasureCount_ * sizeof(double));
+    found.insert_or_assign(number, std::move(values));
+  });
+  if (end < file_.size()) file_.cutTo(end);
   return found;
+}
+
+std::optional<std::size_t> SimulatedValuesFile::openToRead(const ResultRows& rows) {
+  const std::string expected = head();
+  if (readFileIfThere(path_, expected.size()) != expected) return std::nullopt;
+  file_.openToRead(path_);
+  walkRecords(rows, [](int /*number*/, const char* /*values*/) {});
+  const auto isKnown = [](std::int64_t offset) { return offset > 0; };
+  return static_cast<std::size_t>(std::count_if(offsets_.begin(), offsets_.end(), isKnown));
 }
 
 void SimulatedValuesFile::noteOffset(int number, std::int64_t offset) {

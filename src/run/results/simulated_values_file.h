@@ -2,6 +2,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <functional>
 #include <map>
 #include <optional>
 #include <span>
@@ -46,6 +47,10 @@ class SimulatedValuesFile final {
   /// written.
   std::map<int, KeptValues> takeUp(const ResultRows& rows);
 
+  /// Opens the file of another run, which is left as it is, to read what it has of the successful evaluations among
+  /// `rows`; returns of how many. Empty where there is no such file, or one of another precision or of other times.
+  std::optional<std::size_t> openToRead(const ResultRows& rows);
+
   /// Writes the values of a successful evaluation; `parameterValues` as in its row. Throws FatalError when that fails.
   void add(std::span<const double> parameterValues, const EvaluationResult& result);
 
@@ -67,6 +72,9 @@ class SimulatedValuesFile final {
   std::size_t recordedCount() const { return valueCount_ + exactMeasureCount_; }
   std::size_t contentLength() const { return sizeof(std::int64_t) + recordedCount() * sizeof(double); }
   std::size_t recordLength() const { return contentLength() + sizeof(std::uint64_t); }
+  /// Notes where the records of the successful evaluations among `rows` are, and passes them on. Returns where the last
+  /// whole record ends.
+  std::int64_t walkRecords(const ResultRows& rows, const std::function<void(int number, const char* values)>& take);
   void addRowsToChecksums(const ResultRows& rows) const;
   void read(std::int64_t offset, char* bytes, std::size_t size) const;
   void noteOffset(int number, std::int64_t offset);

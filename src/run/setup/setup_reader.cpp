@@ -83,7 +83,7 @@ class SetupReader final {
       config_.task->read({target_, config_.parameters, sections_.parameters, config_.constraints,
                           config_.variableParameterCount(),
                           [this](bool hasInitialSample) { requireScales(hasInitialSample); }, config_.period,
-                          config_.setupFolder + "/" + config_.setupName});
+                          config_.setupFolder + "/" + config_.setupName, config_.measures, config_.objectives});
       for (std::size_t i = 0; i < config_.parameters.size(); ++i) {
         config_.parameters[i].givenValues = config_.task->givenValues(i);
       }

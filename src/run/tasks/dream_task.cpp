@@ -3,11 +3,10 @@
 #include <fmt/format.h>
 
 #include "algorithms/bayes/posterior.h"
-#include "common/calendar.h"
-#include "measures/dates.h"
 #include "run/tasks/analysis_names.h"
 #include "run/tasks/distribution_reading.h"
 #include "run/tasks/posterior_bands.h"
+#include "run/tasks/sample_bands.h"
 
 namespace mirevo {
 namespace {
@@ -37,15 +36,7 @@ void DreamTask::read(const TaskReading& reading) {
   const SetupSection section = reading.target.open(kUncertaintySection);
   UncertaintySection filled{settings, randomSeed};
   section.read(uncertaintySection(), filled);
-  if (settings.bandEnd) {
-    const bool isSound = settings.bandTimes == BandTimes::steps && isValidDate(*settings.bandEnd) &&
-                         daysSince(reading.period.end, *settings.bandEnd) >= 0.0;
-    if (!isSound) {
-      section.refuse("Error: End date of the bands invalid", kBandEndKeyword,
-                     fmt::format("expected the end of the evaluation period, {}, or later, with {} = 'steps'",
-                                 formatDate(reading.period.end), kBandTimesKeyword));
-    }
-  }
+  section.require(validateBandEnd(settings, reading.period));
   prior_ = readDistributions(reading, section);
   if (const auto discrete = prior_.firstWithoutDensity()) {
     section.refuse("Error: Prior of DREAM invalid", "Uncertainty_Type",
@@ -68,8 +59,7 @@ void DreamTask::read(const TaskReading& reading) {
 }
 
 std::optional<KeptSteps> DreamTask::keptSteps() const {
-  if (settings.bandTimes != BandTimes::steps) return std::nullopt;
-  return KeptSteps{settings.bandEnd};
+  return bandSteps(settings);
 }
 
 std::string DreamTask::description() const {
@@ -110,6 +100,7 @@ TaskOutcome DreamTask::outcomeOf(const TaskContext& context) const {
 TaskOutcome DreamTask::run(const TaskContext& context) {
   target_ = std::make_unique<DreamTarget>(dream, prior_, context);
   for (const std::string& line : target_->descriptionLines()) context.log.line(line);
+  logBandTimes(context, settings);
   sampler_ = std::make_unique<DreamSampler>(dream.sampler, target_->problem(context), randomSeed);
   bool wasBurningIn = true;
   std::size_t checks = 0;

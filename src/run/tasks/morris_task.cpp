@@ -64,7 +64,7 @@ std::vector<std::string> MorrisTask::warnings(const SearchSpace& /*space*/) cons
   return {fmt::format("{} = {}: {}", kTrajectoriesKeyword, settings.trajectories,
                       settings.trajectories < static_cast<std::int32_t>(kFewestEffects)
                           ? "too few for limits, and for a statement on which parameters can be fixed"
-                          : "so few that limits are wide, that of sigma has none, and a ranking may not hold")};
+                          : "so few that limits are wide, sigma has none, and a ranking may not hold")};
 }
 
 void MorrisTask::requireSets(const SearchSpace& space, const Feasibility& feasibility) const {

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <bit>
 #include <limits>
+#include <utility>
 
 #include <fmt/format.h>
 
@@ -215,14 +216,20 @@ TaskOutcome SobolTask::outcomeOf(const TaskContext& context, std::span<const Eva
     sets.push_back(set);
   }
   std::size_t first = 0;
+  std::vector<std::size_t> taken;  // measures: several may compare the same series
   for (const ObservedSeries& observed : context.observedSeries) {
     if (!keepsSimulatedValues()) break;
-    const std::string& name = context.measures[observed.measure].name;
+    const std::size_t begin = std::exchange(first, first + observed.days.size());
+    const OutputMeasure& measure = context.measures[observed.measure];
+    const bool isRepeated =
+        std::ranges::any_of(taken, [&](std::size_t other) { return isSamePair(measure, context.measures[other]); });
+    if (isRepeated) continue;
+    taken.push_back(observed.measure);
+    const std::string& name = measure.name;
     const SobolSeries series = sobolSeries(
         name, observed, findings.design, factors_, sets,
-        [&](std::size_t index, std::size_t count) { return context.simulatedColumns(numbers, first + index, count); },
+        [&](std::size_t index, std::size_t count) { return context.simulatedColumns(numbers, begin + index, count); },
         bootstrap);
-    first += observed.days.size();
     outcome.files.push_back(
         {runFilePath(context.filePrefix, run_files::kSobolSeries, static_cast<int>(observed.measure) + 1),
          series.text});

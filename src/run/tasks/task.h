@@ -9,6 +9,7 @@
 #include <string_view>
 #include <vector>
 
+#include "algorithms/analyses/evaluated_sample.h"
 #include "algorithms/searches/search_method.h"
 #include "common/data_table.h"
 #include "common/progress_messages.h"
@@ -28,6 +29,7 @@
 
 namespace mirevo {
 
+class ParameterDistributions;
 struct SensitivitySettings;
 struct SobolSettings;
 
@@ -59,6 +61,8 @@ struct TaskReading {
   std::function<void(bool hasInitialSample)> requireScales;
   EvaluationPeriod period = {};
   std::string filePrefix = {};  ///< folder and name of the setup: the beginning of the paths of the run's files
+  std::span<const OutputMeasure> measures = {};
+  std::span<const ObjectiveFunction> objectives = {};
 };
 
 /// What was expected instead of so many sets of n parameters, all of which are in memory; empty if they fit into it.
@@ -87,9 +91,13 @@ struct TaskContext {
   /// empty.
   std::function<std::vector<std::string>(std::span<const double> variable)> otherParameters = {};
   /// SimulatedValuesFile::columns(), if the task readsSimulatedValues().
-  std::function<std::vector<double>(std::span<const int> numbers, std::size_t first, std::size_t count)>
-      simulatedColumns = {};
+  SimulatedColumns simulatedColumns = {};
   std::span<const ValidationPeriod> validationPeriods = {};
+  /// The evaluations of an earlier run with the same parameters, output measures and objective functions, by the path
+  /// of its result file. Throws FatalError. May be empty.
+  std::function<EarlierSample(const std::string& resultFile)> earlierSample = {};
+  /// The observations in validation periods, if the task keepsSimulatedValues().
+  std::span<const ValidationObservations> validationObservations = {};
 };
 
 /// A file beside the results.
@@ -108,13 +116,15 @@ struct TaskOutcome {
 
 /// What a report shows of a task besides its evaluations.
 struct TaskReport {
-  std::string algorithm = {};                        ///< the name of the search: "DDS"; empty: none
-  std::string surrogate = {};                        ///< the surrogate model that assists it; empty: none
-  int populationSize = 0;                            ///< 0: none
-  bool hasBands = false;                             ///< it writes bands of simulated series
-  const SensitivitySettings* sensitivity = nullptr;  ///< for a local sensitivity analysis, else null
-  bool hasMorris = false;                            ///< it writes the table of a Morris screening
-  const SobolSettings* sobol = nullptr;              ///< for Sobol' indices, else null
+  std::string algorithm = {};                             ///< the name of the search: "DDS"; empty: none
+  std::string surrogate = {};                             ///< the surrogate model that assists it; empty: none
+  int populationSize = 0;                                 ///< 0: none
+  bool hasBands = false;                                  ///< it writes bands of simulated series
+  bool isGlue = false;                                    ///< it writes the weights of GLUE
+  const SensitivitySettings* sensitivity = nullptr;       ///< for a local sensitivity analysis, else null
+  bool hasMorris = false;                                 ///< it writes the table of a Morris screening
+  const SobolSettings* sobol = nullptr;                   ///< for Sobol' indices, else null
+  const ParameterDistributions* distributions = nullptr;  ///< from which the sets were drawn; null: none
   std::vector<std::string> runNames = {};  ///< of the evaluations, from the first on; empty where one has none
 };
 

@@ -1,96 +1,16 @@
 #include "run/tasks/uncertainty_task.h"
 
-#include <algorithm>
-#include <cmath>
-#include <cstdint>
-
 #include <fmt/format.h>
 
+#include "algorithms/analyses/sample_sensitivity.h"
 #include "algorithms/analyses/sampled_distributions.h"
-#include "algorithms/analyses/series_band.h"
-#include "common/calendar.h"
-#include "common/fatal_error.h"
-#include "common/files.h"
-#include "common/text.h"
-#include "measures/dates.h"
 #include "run/tasks/analysis_names.h"
 #include "run/tasks/distribution_reading.h"
 #include "run/tasks/infeasible_sets.h"
+#include "run/tasks/sample_bands.h"
 #include "run/tasks/simulated_room.h"
 
 namespace mirevo {
-namespace {
-
-std::size_t countWithoutObservation(const ObservedSeries& series) {
-  return static_cast<std::size_t>(
-      std::count_if(series.values.begin(), series.values.end(), [](double value) { return std::isnan(value); }));
-}
-
-/// "Band of flow at 365 times from 2001-01-01 00:00 to 2001-12-31 00:00, 10 of them without an observation"
-std::string bandTimesText(const std::string& name, const ObservedSeries& series) {
-  const std::int64_t origin = secondNumber(series.start);
-  const auto dateOf = [&](double days) { return formatDate(dateOfSecond(secondAfter(origin, days))); };
-  return fmt::format("Band of {} at {} times from {} to {}, {} of them without an observation", name,
-                     series.days.size(), dateOf(series.days.front()), dateOf(series.days.back()),
-                     countWithoutObservation(series));
-}
-
-std::optional<SettingRefusal> validateBandEnd(const UncertaintySettings& settings, const EvaluationPeriod& period) {
-  if (!settings.bandEnd) return std::nullopt;
-  try {
-    date_check(*settings.bandEnd, kDateFieldCount);
-  } catch (const FatalError& error) {
-    return SettingRefusal{error.message(), kBandEndKeyword, "no day and time of the calendar"};
-  }
-  constexpr const char* kRefusal = "Error: End date of the bands invalid";
-  if (settings.bandTimes != BandTimes::steps) {
-    return SettingRefusal{kRefusal, kBandEndKeyword,
-                          fmt::format("expected {} = 'steps' beside it: behind the evaluation period there are no "
-                                      "observations that count",
-                                      kBandTimesKeyword)};
-  }
-  if (daysSince(period.end, *settings.bandEnd) >= 0.0) return std::nullopt;
-  return SettingRefusal{kRefusal, kBandEndKeyword,
-                        fmt::format("expected the end of the evaluation period, {}, or later, found {}",
-                                    formatDate(period.end), formatDate(*settings.bandEnd))};
-}
-
-/// Adds the band of each series to `files` and returns one line on each for the report.
-std::vector<std::string> reportBands(const TaskContext& context, bool hasSteps,
-                                     std::span<const EvaluationResult> results, std::vector<TaskFile>& files) {
-  std::vector<int> numbers;
-  for (const EvaluationResult& result : results) {
-    if (result.ok()) numbers.push_back(result.number);
-  }
-  std::vector<std::string> lines;
-  std::size_t first = 0;
-  for (const ObservedSeries& observed : context.observedSeries) {
-    const SeriesBand band = seriesBand(observed.values, numbers.size(), [&](std::size_t index, std::size_t count) {
-      return context.simulatedColumns(numbers, first + index, count);
-    });
-    first += observed.values.size();
-    const std::string& name = context.measures[observed.measure].name;
-    files.push_back({runFilePath(context.filePrefix, run_files::kBand, static_cast<int>(observed.measure) + 1),
-                     seriesBandText(name, observed, band, hasSteps)});
-    lines.push_back(band.observationCount == 0
-                        ? fmt::format("Band of {}: no observation has a simulated value", name)
-                        : fmt::format("Band of {}: {:.1f} % of {} observations lie between the 5 and the 95 % quantile",
-                                      name, 100.0 * band.shareInside, band.observationCount));
-    if (hasSteps) {
-      lines.push_back(fmt::format("   at {} times, {} of them without an observation; quantiles of {} runs{}",
-                                  observed.days.size(), countWithoutObservation(observed), band.mostRuns,
-                                  band.fewerRunsCount > 0 ? " at most" : ""));
-    }
-    lines.push_back("   " + files.back().path);
-    if (const std::string fewer = fewerRunsText(band); !fewer.empty()) {
-      lines.push_back("   " + fewer);
-      context.log.warning(fmt::format("Band of {}: {}", name, fewer));
-    }
-  }
-  return lines;
-}
-
-}  // namespace
 
 const TaskFacts& UncertaintyTask::facts() const {
   static constexpr TaskFacts kFacts{{3, "uncertainty"},
@@ -143,8 +63,7 @@ std::vector<double> UncertaintyTask::givenValues(std::size_t parameter) const {
 }
 
 std::optional<KeptSteps> UncertaintyTask::keptSteps() const {
-  if (settings.bandTimes != BandTimes::steps) return std::nullopt;
-  return KeptSteps{settings.bandEnd};
+  return bandSteps(settings);
 }
 
 std::string UncertaintyTask::description() const {
@@ -197,40 +116,29 @@ TaskOutcome UncertaintyTask::outcomeOf(const TaskContext& context, const Uncerta
       formatUncertainty(summary, names, fileNameOf(runFilePath(context.filePrefix, run_files::kSampleCorrelation)));
   outcome.report.insert(outcome.report.begin() + 1, setsOutsideBounds(found.sample, context.space));
   outcome.tables = uncertaintyTables(summary, names);
-  const std::vector<std::string> bands = reportBands(context, keptSteps().has_value(), found.results, outcome.files);
+  const bool areCorrelated = settings.distributions.copula().has_value();
+  const SampleSensitivity sensitivity = sampleSensitivity(found, context.space, names, randomSeed);
+  outcome.tables.push_back(sampleSensitivityTable(sensitivity, names, areCorrelated));
+  const std::vector<std::string> dependences = formatSampleSensitivity(
+      sensitivity, names, fileNameOf(runFilePath(context.filePrefix, run_files::kSampleSensitivities)), areCorrelated);
+  outcome.report.insert(outcome.report.end(), dependences.begin(), dependences.end());
+  std::vector<int> numbers;
+  for (const EvaluationResult& result : found.results) {
+    if (result.ok()) numbers.push_back(result.number);
+  }
+  const std::vector<std::string> bands =
+      reportBands(context, settings, numbers, {}, context.simulatedColumns, outcome.files);
   outcome.report.emplace_back();
   outcome.report.insert(outcome.report.end(), bands.begin(), bands.end());
   return outcome;
-}
-
-/// Before the first model run, so that an end of the steps that is not meant is seen in time.
-void UncertaintyTask::logBandTimes(const TaskContext& context) const {
-  if (!keptSteps()) return;
-  for (const ObservedSeries& series : context.observedSeries) {
-    const OutputMeasure& measure = context.measures[series.measure];
-    const std::string& name = measure.name;
-    if (!measure.timeMatch.isUsual()) {
-      context.log.line(
-          fmt::format("Band of {}: at the observations alone, because of its Time_Match or Time_Offset", name));
-      continue;
-    }
-    context.log.line(bandTimesText(name, series));
-    const std::size_t count = series.days.size();
-    if (!settings.bandEnd || count < 2) continue;
-    const double last = series.days.back();
-    if (daysSince(series.start, *settings.bandEnd) - last < last - series.days[count - 2]) continue;
-    context.log.warning(fmt::format(
-        "Band of {}: {} in the model's folder has no step at {} = {} or shortly before it, and the band ends earlier",
-        name, trimTrailing(measure.simulation.fileName), kBandEndKeyword, formatDate(*settings.bandEnd)));
-  }
 }
 
 TaskOutcome UncertaintyTask::run(const TaskContext& context) {
   std::string acceptance;
   std::vector<ParameterSet> sample = drawSample(context, acceptance);
   context.log.line(setsOutsideBounds(sample, context.space));
-  logBandTimes(context);
-  logRoomOfSimulatedValues(context, run_files::kPlain.simulatedValues, sample.size());
+  logBandTimes(context, settings);
+  logRoomOfSimulatedValues(context, run_files::kPlain.simulatedValues, static_cast<std::size_t>(settings.sampleSize));
   const UncertaintyOutcome found = uncertaintyAnalysis(std::move(sample), context.evaluator);
   TaskOutcome outcome = outcomeOf(context, found);
   if (!acceptance.empty()) outcome.report.insert(outcome.report.begin() + 1, acceptance);

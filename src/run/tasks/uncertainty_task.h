@@ -24,13 +24,12 @@ class UncertaintyTask final : public Task {
   void requireSets(const SearchSpace& space, const Feasibility& feasibility) const override;
   TaskOutcome run(const TaskContext& context) override;
   std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const override;
-  TaskReport report() const override { return {.hasBands = true}; }
+  TaskReport report() const override { return {.hasBands = true, .distributions = &settings.distributions}; }
 
   UncertaintySettings settings;
 
  private:
   TaskOutcome outcomeOf(const TaskContext& context, const UncertaintyOutcome& found) const;
-  void logBandTimes(const TaskContext& context) const;
   std::vector<ParameterSet> drawSample(const TaskContext& context, std::string& acceptance) const;
 
   std::vector<std::vector<double>> singleValues_;  ///< of discrete distributions, by parameter

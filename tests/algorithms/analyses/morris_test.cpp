@@ -85,6 +85,42 @@ TEST(ElementaryEffects, EveryPairOfSetsDiffersInOneParameterByTheStep) {
   }
 }
 
+TEST(ElementaryEffects, StepOverTheDistributionsOfTheParameters) {
+  const SearchSpace space =
+      BuildSearchSpace(std::vector{parameter("normal", 0.0, 20.0),
+                                   parameter("rare", 1.0, 5.0, TransformationType::integer), parameter("c", 0.0, 1.0)});
+  const double values[] = {1.5, 2.5, 5.5};
+  const double weights[] = {0.9, 0.05, 0.05};
+  const std::vector<DistributionPointer> ofParameters{normalDistribution(10.0, 2.0),
+                                                      discreteDistribution(values, weights), uniformDistribution(0, 1)};
+  for (const EffectDesign design : kDesigns) {
+    const ParameterDistributions distributions(ofParameters);
+    const EffectPlan plan = planEffects({.design = design, .trajectories = 30}, space, distributions, 1);
+    std::vector<ParameterSet> sets;
+    std::size_t ofRare = 0;
+    for (const EffectTrajectory& trajectory : plan.trajectories) {
+      for (ParameterSet& set : setsOf(plan, trajectory, distributions)) sets.push_back(std::move(set));
+      for (const EffectPair& pair : pairsOf(plan, trajectory)) {
+        const ParameterSet& from = sets.at(static_cast<std::size_t>(pair.from - 1));
+        const ParameterSet& to = sets.at(static_cast<std::size_t>(pair.to - 1));
+        const auto probability = [](double x) { return 0.5 * std::erfc((10.0 - x) / 2.0 / std::sqrt(2.0)); };
+        if (pair.parameter == 0) {
+          EXPECT_NEAR(probability(to[0]) - probability(from[0]), pair.width, 1e-9);
+        }
+        if (pair.parameter != 1) continue;
+        EXPECT_NE(to[1], from[1]);
+        ++ofRare;
+      }
+    }
+    EXPECT_EQ(ofRare + plan.unchanged[1], 30U);
+    EXPECT_EQ(plan.unchanged[1] > 0, design == EffectDesign::trajectories) << "radial steps look for the rare values";
+    EXPECT_FALSE(plan.isCorrelated);
+  }
+  const ParameterDistributions correlated(
+      ofParameters, GaussianCopula({{1.0, 0.0, 0.5}, {0.0, 1.0, 0.0}, {0.5, 0.0, 1.0}}, space.names));
+  EXPECT_TRUE(planEffects({.trajectories = 5}, space, correlated, 1).isCorrelated);
+}
+
 TEST(ElementaryEffects, OnLevelsHitAllOfThemAndTheTrajectoriesTakenAreMostDifferent) {
   const SearchSpace space = spaceOf(3);
   const ParameterDistributions distributions = ParameterDistributions::uniform(space);
@@ -147,7 +183,7 @@ TEST(ElementaryEffects, AFailedRunCostsTheEffectsThatItIsPartOfAndNoMore) {
     const MorrisSettings settings{.design = design, .trajectories = 20, .bootstrapSamples = 100};
     const auto evaluated = [&](const std::set<int>& failed) {
       return screen(settings, space, [&](int number, const auto& x) {
-        return failed.contains(number) ? failedResult() : resultOf(testing::morrisFunction(x));
+        return failed.contains(number) ? failedResult() : resultOf(morrisFunction(x));
       });
     };
     const Screening whole = evaluated({});

@@ -111,21 +111,21 @@ TEST(SeriesBand, HasTheQuantilesOfWhatSucceededAndCountsTheObservationsInside) {
   EXPECT_DOUBLE_EQ(band.lower[2], 1.0 + 99.0 * 0.05);  // 1 to 100
   EXPECT_TRUE(std::isnan(band.lower[3]) && std::isnan(band.median[3]) && std::isnan(band.upper[3]));
   EXPECT_DOUBLE_EQ(band.lower[4], -95.0);
-  EXPECT_EQ(band.observationCount, 4U);
+  EXPECT_EQ(band.coverage.observationCount, 4U);
   EXPECT_EQ(fewerRunsText(band),
             "at 1 of 4 observations the quantiles are of fewer runs than at the others, of 100 to 101: runs have no "
             "value there");
   EXPECT_EQ(fewerRunsText(seriesBand(std::vector{5.0}, 101, read)), "");
-  EXPECT_EQ(band.shareInside, 0.75);
+  EXPECT_EQ(band.coverage.shareInside, 0.75);
   const std::vector<double> values = {5.0, 4.9, NAN, 1.0, NAN};
   const SeriesBand ofSteps = seriesBand(values, 101, read);
-  EXPECT_EQ(ofSteps.observationCount, 2U);
-  EXPECT_EQ(ofSteps.shareInside, 0.5);
+  EXPECT_EQ(ofSteps.coverage.observationCount, 2U);
+  EXPECT_EQ(ofSteps.coverage.shareInside, 0.5);
   EXPECT_THAT(fewerRunsText(ofSteps), StartsWith("at 1 of 4 times the quantiles are of fewer runs"));
   EXPECT_THAT(seriesBandText("flow", {0, {2001, 1, 1}, {0.0, 1.0, 1.5, 2.0, 3.0}, values}, ofSteps, true),
               EndsWith("\n2001-01-02 12:00,,5.95,50.5,95.05,100\n2001-01-03 00:00,1,NaN,NaN,NaN,0\n"
                        "2001-01-04 00:00,,-95,-50,-5,101\n"));
-  EXPECT_TRUE(std::isnan(seriesBand(std::vector{1.0}, 0, [](auto...) { return std::vector<double>(); }).shareInside));
+  EXPECT_TRUE(std::isnan(seriesBand(std::vector{1.0}, 0, [](auto...) { return std::vector<double>(); }).coverage.shareInside));
 }
 
 }  // namespace

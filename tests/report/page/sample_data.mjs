@@ -101,6 +101,11 @@ export function hostile(data) {
     data.sensitivity.covariance.names = data.sensitivity.covariance.names.map(rename);
     data.sensitivity.covariance.leftOut = [{ name: kHostile[0], reason: kHostile[1] }];
   }
+  for (const screening of data.morris ?? []) {
+    screening.name = rename(screening.name);
+    for (const parameter of screening.parameters) parameter.name = rename(parameter.name);
+    Object.assign(screening.parameters[0], { sigma: [1, null, null], verdict: 'fix' });
+  }
   if (data.sobol) {
     data.sobol.factors = data.sobol.factors.map(rename);
     for (const output of data.sobol.outputs) output.name = rename(output.name);

@@ -9,7 +9,9 @@ int main(int argc, char** argv) {
       {"optimisation", {.algorithm = 0, .maxEvaluations = 120, .modelArguments = "--fail-above 9"}},
       {"short", {.maxEvaluations = 12}},
       {"uncertainty", {.option = 3, .maxEvaluations = 60, .modelArguments = "--fail-above 6"}},
+      {"glue", {.option = 3, .maxEvaluations = 120, .modelArguments = "--fail-above 9.5"}},
       {"sensitivity", {.option = 1}},
+      {"screening", {.option = 1}},
       {"sobol", {.option = 1}},
       {"scenarios", {.option = 0, .scenarios = scenarios(30)}},
       {"allFailed", {.option = 0, .scenarios = scenarios(30), .modelArguments = "--fail-above -1"}}};
@@ -17,9 +19,18 @@ int main(int argc, char** argv) {
   for (const auto& [name, settings] : samples) {
     const ModelFolder folder;
     const std::string setup = folder.writeSetup(settings);
+    if (name == "screening") folder.editSetup("Sensitivity_Type = 0", "Sensitivity_Type = 'Morris'");
     if (name == "sobol") {
+      folder.editSetup("Parameter_Type = 1", "Parameter_Type = 0");
       folder.editSetup("Sensitivity_Type = 0",
                        "Sensitivity_Type = 'Sobol'\n[SOBOL]\nSample_Size = 64\nSecond_Order = 1\n[/SOBOL]");
+    }
+    if (name == "glue") {
+      folder.editSetup("Uncertainty_Type = 1", "Uncertainty_Type = 'GLUE'\n[GLUE]\nBehavioural_Threshold = 1\n[/GLUE]");
+      // Without distributions of their own, parameters are as likely anywhere between their bounds.
+      const std::string text = folder.read("basin.kdx");
+      folder.write("basin.kdx", text.substr(0, text.find("    [PARAMETER_1]\n      Mean_Value")) +
+                                    text.substr(text.find("  [/UNCERTAINTY_ESTIMATION]")));
     }
     runProgram({setup});
     std::filesystem::copy_file(folder / "basin_Report.html", std::string(argv[1]) + "/" + name);

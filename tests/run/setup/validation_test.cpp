@@ -344,7 +344,9 @@ std::vector<RowInSetup> rowsInSetups(const std::string& setup) {
       {"SCENARIOS", "0"}, {"SENSITIVITY_ANALYSIS", "1"}, {"UNCERTAINTY_ESTIMATION", "3"}};
   static const std::pair<std::string_view, const char*> kAlgorithms[] = {
       {"SCE_", "0"}, {"DDS_", "2"}, {"PDDS_", "'PDDS'"}, {"OPSE_", "'OPSE'"}, {"CMAES_", "'CMA-ES'"}};
-  static const std::pair<std::string_view, const char*> kForms[] = {{"/MORRIS", "'Morris'"}};
+  // Forms of the sensitivity analysis with a section of their own, and what that needs.
+  static const std::tuple<std::string_view, const char*, const char*> kForms[] = {
+      {"MORRIS", "'Morris'", ""}, {"SOBOL", "'Sobol'", "Sample_Size = 64\n"}};
   std::vector<RowInSetup> found;
   for (const SectionRow* section : setupSchema().sections()) {
     // Which keywords of these are read depends on others of them: tests/run/tasks/distribution_reading_test.cpp.
@@ -358,13 +360,20 @@ std::vector<RowInSetup> rowsInSetups(const std::string& setup) {
         text = SetupFixture::withValue(text, "MIREVO_SIMULATION_OPTION", "Option", option);
       }
     }
+    if (section->path.ends_with("/GLUE")) {
+      text = SetupFixture::withValue(text, "UNCERTAINTY_ESTIMATION", "Uncertainty_Type", "'GLUE'");
+      text = SetupFixture::withValue(text, "ObjectiveFunctions/OUTPUT_MEASURES/MEASURE_n", "Statistic_Type", "'NSE'");
+    }
     for (const auto& [start, algorithm] : kAlgorithms) {
       if (section->path.find(start) == std::string_view::npos) continue;
       text = SetupFixture::withValue(text, "OPTIMISATION_ALGORITHM", "Algorithm_Type", algorithm);
       text = SetupFixture::withValue(text, "SimultaneousSimulations", "NoSimultaneousSim", "1");
     }
-    for (const auto& [end, form] : kForms) {
-      if (!section->path.ends_with(end)) continue;
+    for (const auto& [name, form, needed] : kForms) {
+      if (!section->path.starts_with("SENSITIVITY_ANALYSIS")) continue;
+      const std::string end = "[/LOCAL_SA]\n";
+      text.insert(text.find(end) + end.size(), fmt::format("[{0}]\n{1}[/{0}]\n", name, needed));
+      if (section->path != fmt::format("SENSITIVITY_ANALYSIS/{}", name)) continue;
       text = SetupFixture::withValue(text, "SENSITIVITY_ANALYSIS", "Sensitivity_Type", form);
     }
     for (const KeywordRow& row : section->keywords) {

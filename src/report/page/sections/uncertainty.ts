@@ -1,6 +1,7 @@
 // The results of an uncertainty analysis: distributions, and the band of every simulated series.
 import { axis, chart, legend, lineEntries, timeZoom, tip, tooltip, type ChartPlan } from '../chart';
-import { timesOf, variableParameters, type Band, type Maybe, type ReportData } from '../data';
+import { timesOf, variableParameters, type Band, type Distribution, type Maybe, type ReportData } from '../data';
+import { shorten } from '../dom';
 import { count, moment, number, percent } from '../format';
 import { nearest } from '../lines';
 import { finite, histogram, spaced, type Bin } from '../numbers';
@@ -12,12 +13,22 @@ import { labelOf, outside, outsidePeriod } from './series';
 const kBandPoints = 1500; // across the chart: more than it has pixels
 const kFewValues = 150; // observed values up to which each has a dot
 
-function histogramPlan(name: string, values: Maybe[], wantsLog = false): ChartPlan {
+// How many of `count` values the distribution has in each bin; the last bin has its upper end, too.
+function expected({ quantiles }: Distribution, bins: Bin[], count: number): number[] {
+  const places = finite(quantiles);
+  return bins.map(({ from, to }, index) =>
+    (count * places.filter((value) => value >= from && (value < to || (index === bins.length - 1 && value === to))).length) / places.length);
+}
+
+function histogramPlan(name: string, values: Maybe[], wantsLog = false, distribution?: Distribution): ChartPlan {
   const log = wantsLog && finite(values).every((value) => value > 0);
   const bins = histogram(values, log);
+  const wanted = distribution ? expected(distribution, bins, finite(values).length) : [];
+  const middle = ({ from, to }: Bin) => (log ? Math.sqrt(from * to) : (from + to) / 2);
   const bounds = (bin: Bin) => `${number(bin.from)} to ${number(bin.to)}`;
   return {
     title: name,
+    ...(distribution ? { note: `Drawn from: ${shorten(distribution.text, 120)}; the line has as many in each bar.` } : {}),
     height: 210,
     small: true,
     option: (look) => ({
@@ -26,7 +37,8 @@ function histogramPlan(name: string, values: Maybe[], wantsLog = false): ChartPl
         ...(log ? logRange([bins.flatMap(({ from, to }) => [from, to])]) : {}), min: bins[0]?.from, max: bins[bins.length - 1]?.to }),
       yAxis: axis(look, { scale: false, splitNumber: 3, minInterval: 1 }),
       tooltip: tooltip(look, { formatter: (bar: { dataIndex: number }) =>
-        tip(bounds(bins[bar.dataIndex]!), [['evaluations', count(bins[bar.dataIndex]!.count)]]) }),
+        tip(bounds(bins[bar.dataIndex]!), [['evaluations', count(bins[bar.dataIndex]!.count)],
+          ...(distribution ? [['expected', number(wanted[bar.dataIndex], 3)] as [string, string]] : [])]) }),
       series: [{
         type: 'custom', color: look.bars, encode: { x: [0, 1], y: 2 }, data: bins.map((bin) => [bin.from, bin.to, bin.count]),
         renderItem: (_: unknown, api: CustomApi) => {
@@ -34,12 +46,16 @@ function histogramPlan(name: string, values: Maybe[], wantsLog = false): ChartPl
           const [right, bottom] = api.coord([api.value(1), 0]);
           return { type: 'rect', shape: { x: left!, y: top!, width: Math.max(1, right! - left! - 1), height: bottom! - top! }, style: { fill: look.bars } };
         },
-      }],
+      }, ...(distribution ? [{
+        type: 'line', symbol: 'none', color: look.best, lineStyle: { color: look.best, width: 2 },
+        data: bins.map((bin, index) => [middle(bin), wanted[index]]),
+      }] : [])],
     }),
     values: () => ({
-      columns: [{ title: 'From' }, { title: 'To', number: true }, { title: 'Evaluations', number: true }],
+      columns: [{ title: 'From' }, ...['To', 'Evaluations', ...(distribution ? ['Expected'] : [])].map((title) => ({ title, number: true }))],
       length: bins.length,
-      row: (index) => [number(bins[index]!.from), number(bins[index]!.to), count(bins[index]!.count)],
+      row: (index) => [number(bins[index]!.from), number(bins[index]!.to), count(bins[index]!.count),
+        ...(distribution ? [number(wanted[index], 4)] : [])],
     }),
   };
 }
@@ -111,7 +127,9 @@ function runsNote({ runs, fewestRuns, mostRuns }: Band): string {
 
 function coverageNote(band: Band): string {
   if (band.n === 0) return 'No observed value has a simulated one at its time.';
-  return `${percent(band.inside)} of ${band.n === null ? 'the' : count(band.n)} observed values lie within the band.`;
+  const width = band.width == null ? '' : ` It is ${number(band.width)}${band.unit ? ` ${band.unit}` : ''} wide on average at them${
+    band.relativeWidth == null ? '' : `, ${number(band.relativeWidth, 3)} of their standard deviation`}.`;
+  return `${percent(band.inside)} of ${band.n === null ? 'the' : count(band.n)} observed values lie within the band.${width}`;
 }
 
 function bandPlan(band: Band, period: [number, number] | null): ChartPlan {
@@ -191,7 +209,7 @@ export function bandSection(data: ReportData): Section | null {
 
 export function distributionSection(data: ReportData): Section | null {
   const inputs = variableParameters(data).map(({ name, transformation }, index) =>
-    chart(histogramPlan(name, data.evaluations.parameters[index] ?? [], transformation === 'logarithmic')));
+    chart(histogramPlan(name, data.evaluations.parameters[index] ?? [], transformation === 'logarithmic', data.distributions?.[index])));
   const outputs = judgements(data).map(({ name, values }) => chart(histogramPlan(name, values)));
   if (data.evaluations.count < 2 || inputs.length + outputs.length === 0) return null;
   return {

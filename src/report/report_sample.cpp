@@ -1,0 +1,96 @@
+#include "report/report_sample.h"
+
+#include <algorithm>
+#include <limits>
+
+#include <fmt/format.h>
+
+#include "common/data_table.h"
+#include "common/files.h"
+#include "common/run_files.h"
+
+namespace mirevo {
+
+std::vector<ReportedDistribution> reportedDistributions(const ParameterDistributions& distributions,
+                                                        const SearchSpace& space) {
+  // A bar of a histogram with a twentieth of the values is then drawn to a fortieth.
+  constexpr int kMost = 800;
+  constexpr int kFewest = 50;
+  constexpr int kAll = 40'000;
+  std::vector<ReportedDistribution> reported;
+  if (distributions.size() != space.size()) return reported;
+  const int count = std::clamp(kAll / static_cast<int>(space.size()), kFewest, kMost);
+  for (std::size_t j = 0; j < space.size(); ++j) {
+    const Distribution& distribution = distributions[j];
+    const bool isLogarithm =
+        space.transformation[j] == TransformationType::logarithmic && !distribution.isGivenOnModelScale();
+    ReportedDistribution& one = reported.emplace_back();
+    one.text = fmt::format("{}, {}{}", distribution.name(), distribution.text(),
+                           isLogarithm ? " of the natural logarithm" : "");
+    for (int k = 0; k < count; ++k)
+      one.quantiles.push_back(toModelScale(space, j, distribution.quantile((k + 0.5) / count)));
+  }
+  return reported;
+}
+
+std::optional<ReportedSampleSensitivity> reportedSampleSensitivity(const std::string& filePrefix,
+                                                                   std::span<const std::string> parameters,
+                                                                   std::string& fault) {
+  const std::string path = runFilePath(filePrefix, run_files::kSampleSensitivities);
+  const auto text = readFileIfThere(path);
+  if (!text) return std::nullopt;
+  const ReadTable table = readDataTable(*text);
+  ReportedSampleSensitivity found;
+  found.parameters.assign(parameters.begin(), parameters.end());
+  const std::size_t p = parameters.size();
+  std::vector<std::vector<double>>* const members[] = {&found.rankCorrelations, &found.firstOrder, &found.lower,
+                                                       &found.upper};
+  for (auto* member : members) member->resize(p);
+  const auto column = [&](std::string_view name) { return table.column(name); };
+  const std::optional<std::size_t> numbers[] = {column("RankCorrelation"), column("FirstOrder"), column("Lower"),
+                                                column("Upper")};
+  const auto kind = column("Kind");
+  const auto output = column("Output");
+  const auto parameter = column("Parameter");
+  const bool hasColumns =
+      kind && output && parameter && std::ranges::all_of(numbers, [](const auto& of) { return of.has_value(); });
+  bool isWhole = hasColumns && p > 0 && table.rows.size() % p == 0;
+  for (std::size_t row = 0; isWhole && row < table.rows.size(); ++row) {
+    const std::vector<std::string>& cells = table.rows[row];
+    const std::size_t j = row % p;
+    isWhole = cells[*parameter] == parameters[j];
+    if (j == 0) {
+      found.outputs.push_back(cells[*output]);
+      found.kinds.push_back(cells[*kind]);
+    }
+    for (std::size_t k = 0; k < std::size(members); ++k) {
+      (*members[k])[j].push_back(realCell(cells[*numbers[k]]).value_or(std::numeric_limits<double>::quiet_NaN()));
+    }
+  }
+  if (!isWhole) {
+    fault = fmt::format("{} is cut off or damaged, and not shown", fileNameOf(path));
+    return std::nullopt;
+  }
+  found.areCorrelated = std::ranges::any_of(
+      table.headLines, [](const std::string& line) { return line.find("with correlations") != std::string::npos; });
+  return found;
+}
+
+void writeSample(JsonWriter& json, const ReportData& data) {
+  using Digits = JsonWriter::Digits;
+  json.key("distributions").beginArray();
+  for (const ReportedDistribution& one : data.distributions) {
+    json.beginObject().member("text", one.text).key("quantiles").numbers(one.quantiles, Digits::drawn).endObject();
+  }
+  json.endArray();
+  if (!data.sampleSensitivity) return;
+  const ReportedSampleSensitivity& found = *data.sampleSensitivity;
+  json.key("sampleSensitivity").beginObject().member("parameters", found.parameters);
+  json.member("outputs", found.outputs).member("kinds", found.kinds);
+  json.key("rankCorrelations").rows(found.rankCorrelations, Digits::drawn);
+  json.key("firstOrder").rows(found.firstOrder, Digits::drawn);
+  json.key("lower").rows(found.lower, Digits::drawn).key("upper").rows(found.upper, Digits::drawn);
+  json.member("areCorrelated", found.areCorrelated).endObject();
+}
+
+}  // namespace mirevo

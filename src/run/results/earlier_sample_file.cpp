@@ -1,0 +1,190 @@
+#include "run/results/earlier_sample_file.h"
+
+#include <algorithm>
+#include <memory>
+#include <optional>
+#include <string_view>
+#include <utility>
+#include <vector>
+
+#include <fmt/format.h>
+
+#include "common/fatal_error.h"
+#include "common/files.h"
+#include "common/run_files.h"
+#include "common/text.h"
+#include "measures/kept_steps.h"
+#include "run/results/restart_settings.h"
+#include "run/results/result_table.h"
+#include "run/results/row_check.h"
+#include "run/results/row_checksums.h"
+#include "run/results/simulated_values_file.h"
+
+namespace mirevo {
+namespace {
+
+constexpr std::string_view kRefusal = "Error: Earlier result file invalid";
+constexpr std::size_t kMostShown = 10;
+
+[[noreturn]] void refuse(const std::string& file, std::string_view detail) {
+  fatalError(std::string(kRefusal), fmt::format("{}: {}", file, detail));
+}
+
+/// A file beside the results of the earlier run: `basin_Optimisation` and `_Restart.dat`.
+std::string pathBesideResults(const std::string& resultFile, const RunFile& file) {
+  const std::size_t ending = resultFile.rfind('.');
+  return runFilePath(resultFile.substr(0, ending), file);
+}
+
+/// Those settings, and files, for which the condition is true; it gets section and keyword.
+template <class Condition>
+RestartSettings only(const RestartSettings& all, Condition isWanted) {
+  RestartSettings some;
+  some.program = all.program;
+  std::ranges::copy_if(all.settings, std::back_inserter(some.settings),
+                       [&](const ResultSetting& one) { return isWanted(one.section, one.keyword); });
+  std::ranges::copy_if(all.files, std::back_inserter(some.files),
+                       [&](const FileMark& one) { return isWanted(one.section, one.keyword); });
+  return some;
+}
+
+bool isOfJudgement(std::string_view section, std::string_view /*keyword*/) {
+  return section.starts_with("ObjectiveFunctions");
+}
+
+/// What decides on the simulated values, and not on which sets there are.
+bool isOfModel(std::string_view section, std::string_view keyword) {
+  if (section.starts_with("MODEL_PARAMETERS")) {
+    return keyword == "Parameter_Type" || keyword == "Parameter_Equation" || keyword == "Parameter_IDValue";
+  }
+  return section.starts_with("MIREVO_SIMULATION_OPTION/");
+}
+
+std::string listOf(std::span<const std::string> lines) {
+  std::string text;
+  for (std::size_t i = 0; i < std::min(lines.size(), kMostShown); ++i) text += "\n   " + lines[i];
+  if (lines.size() > kMostShown) text += fmt::format("\n   and {} more", lines.size() - kMostShown);
+  return text;
+}
+
+/// What the settings of the earlier run say of its evaluations.
+void compareSettings(const std::string& resultFile, const RunConfig& config, EarlierSample& found) {
+  const std::string path = pathBesideResults(resultFile, run_files::restartFile("_Restart"));
+  const auto then = parseRestartSettings(readFileIfThere(path).value_or(""));
+  if (!then) {
+    found.warnings.push_back(
+        fmt::format("{} is not there or damaged: whether the evaluations are of the same observations, "
+                    "measures and model is not known",
+                    path));
+    return;
+  }
+  const RestartSettings now = restartSettings(config);
+  const std::vector<std::string> judged = changedSettings(only(*then, isOfJudgement), only(now, isOfJudgement));
+  if (!judged.empty()) {
+    refuse(resultFile, fmt::format("its evaluations are judged otherwise than this setup would judge them:{}\nGive the "
+                                   "setup the measures, objective functions and observations of that run",
+                                   listOf(judged)));
+  }
+  const std::vector<std::string> model = changedSettings(only(*then, isOfModel), only(now, isOfModel));
+  if (!model.empty()) {
+    found.warnings.push_back(
+        fmt::format("The evaluations in {} are of other settings of the model:{}", resultFile, listOf(model)));
+  }
+  for (const ResultSetting& setting : then->settings) {
+    if (setting.keyword != "Option" || (setting.value != "1" && setting.value != "2")) continue;
+    found.warnings.push_back(fmt::format(
+        "The sets in {} are those of a {} and no sample of a distribution: quantiles and bands say how those sets are "
+        "distributed, and not how uncertain the parameters are",
+        resultFile,
+        setting.value == "1" ? "sensitivity analysis, which change one parameter or few,"
+                             : "search, which went where the fit is better,"));
+  }
+}
+
+ResultRows readRows(const std::string& file, const std::string& text, const RunConfig& config,
+                    const ResultColumns& columns, EarlierSample& found) {
+  ResultRows rows;
+  const ResultTable table = readResultTable(text, columns, rows);
+  if (!table.hasHeader)
+    refuse(file, "expected a result file, with a header row that begins with Evaluation, found none");
+  if (!table.hasExpectedColumns) {
+    refuse(file, fmt::format("expected the variable parameters, output measures and objective functions of this setup, "
+                             "whose header row is\n   {}",
+                             resultHeader(columns)));
+  }
+  const RowChecksums checksums =
+      readRowChecksums(readFileIfThere(pathBesideResults(file, run_files::kPlain.checksums)).value_or(""));
+  std::vector<std::string> faults;
+  for (const RowFault& fault : checkRows(rows, checksums, config, RowOrigin::perhapsOther).faults) {
+    if (checksums.has(fault.number)) faults.push_back(rowFaultText(fault));
+  }
+  if (!faults.empty()) refuse(file, "it has rows that do not hold:" + listOf(faults));
+  if (table.unusableLines > 0) {
+    found.warnings.push_back(
+        fmt::format("Lines of {} that are cut off or damaged are passed over: {}", file, table.unusableLines));
+  }
+  rows.putInOrder();
+  // One that has the result of another would give its set twice the weight.
+  rows.keepIf([&](std::size_t i) { return rows.repeats(i).value_or(0) == 0; });
+  return rows;
+}
+
+void addRows(const ResultRows& rows, EvaluatedSample& sample) {
+  for (const ResultRow& row : rows) {
+    EvaluationResult result;
+    result.number = row.number;
+    result.measureValues = row.measures;
+    result.objectiveValues = row.objectives;
+    result.validationValues = row.validation;
+    if (!row.ok) result.failure.emplace();
+    sample.add(row.parameters, result);
+  }
+}
+
+/// Makes its simulated values readable, if they are of the observations and steps of this run.
+void openValues(const std::string& resultFile, const ResultRows& rows, const RunConfig& config,
+                std::span<const ObservedSeries> observed, EarlierSample& found) {
+  const std::string path = pathBesideResults(resultFile, run_files::kPlain.simulatedValues);
+  const auto times = config.task->keptSteps() ? std::optional(checksumOfTimes(observed)) : std::nullopt;
+  const auto values = std::make_shared<SimulatedValuesFile>(
+      path, simulatedValueCount(observed, SeriesPrecision::single), SeriesPrecision::single, 0, true, times);
+  const std::optional<std::size_t> count = values->openToRead(rows);
+  if (!count) {
+    found.warnings.push_back(fmt::format(
+        "There are no bands: {} is not there, or has the simulated values at other times than this setup asks for "
+        "(Band_Times, Band_End_Date, the observations)",
+        path));
+    return;
+  }
+  const auto succeeded = static_cast<std::size_t>(std::ranges::count(found.sample.ok, true));
+  if (*count < succeeded) {
+    found.warnings.push_back(fmt::format("There are no bands: {} lacks the simulated values of {} of {} evaluations",
+                                         path, succeeded - *count, succeeded));
+    return;
+  }
+  found.simulatedColumns = [values](std::span<const int> numbers, std::size_t first, std::size_t length) {
+    return values->columns(numbers, first, length);
+  };
+}
+
+}  // namespace
+
+EarlierSample readEarlierSample(const std::string& resultFile, const RunConfig& config, const SearchSpace& space,
+                                std::span<const ObservedSeries> observed) {
+  EarlierSample found;
+  std::string reason;
+  auto text = readTextFile(resultFile, reason);
+  if (!text) refuse(resultFile, reason);
+  const ResultRows rows = readRows(resultFile, *text, config, resultColumns(config, space), found);
+  text.reset();
+  addRows(rows, found.sample);
+  const auto succeeded = std::ranges::count(found.sample.ok, true);
+  if (succeeded == 0) refuse(resultFile, "it has no successful evaluation");
+  found.notes.push_back(fmt::format("{} evaluations are taken from {}, {} of them failed", found.sample.size(),
+                                    resultFile, std::ssize(found.sample.ok) - succeeded));
+  compareSettings(resultFile, config, found);
+  openValues(resultFile, rows, config, observed, found);
+  return found;
+}
+
+}  // namespace mirevo
