@@ -103,6 +103,7 @@ class Calibration {
     while (!sampler.isFinished()) sampler.advance();
     leastSize_ = std::min(leastSize_, sampler.checkNow()->leastEffectiveSize());
     std::vector<std::size_t> found(lower_.size(), 0);
+    std::vector<std::size_t> ties(lower_.size(), 0);
     const ChainHistory& history = sampler.history();
     const std::size_t first = *sampler.burnIn();
     const std::size_t states = (history.generations() - first) * history.chainCount();
@@ -110,12 +111,14 @@ class Calibration {
       const std::size_t place = (2 * k + 1) * states / (2 * (kRanks - 1));
       const auto state = history.at(first + place / history.chainCount(), place % history.chainCount());
       for (std::size_t j = 0; j < found.size(); ++j) {
-        // An integer parameter by its values; ties are broken at random.
-        const double own = j == 2 ? std::floor(state.point[j]) : state.point[j];
+        const double own = j == 2 ? std::floor(state.point[j]) : state.point[j];  // of an integer parameter its value
         const double real = j == 2 ? std::floor(truth[j]) : truth[j];
-        if (own < real || (own == real && random.uniform() < 0.5)) ++found[j];
+        if (own < real) ++found[j];
+        if (own == real) ++ties[j];
       }
     }
+    // Among equals each rank is as likely as the others.
+    for (std::size_t j = 0; j < found.size(); ++j) found[j] += random.below(ties[j] + 1);
     return found;
   }
 

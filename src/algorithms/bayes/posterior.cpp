@@ -198,20 +198,19 @@ DataTable chainsTable(const DreamSampler& sampler, const ShownDimensions& dimens
                   {"Generation", "Chain", "Burn_In", "Evaluation", "Accepted", "Log_Likelihood", "Log_Prior"},
                   {}};
   table.columns.insert(table.columns.end(), dimensions.names.begin(), dimensions.names.end());
+  table.realColumns.resize(2 + dimensions.names.size());
   const ChainHistory& history = sampler.history();
   const std::size_t burnIn = sampler.burnIn().value_or(history.generations());
   for (std::size_t g = 0; g < history.generations(); ++g) {
     for (std::size_t c = 0; c < history.chainCount(); ++c) {
       const ChainHistory::State state = history.at(g, c);
-      std::vector<DataTable::Cell>& row = table.rows.emplace_back();
-      row = {static_cast<std::int64_t>(g + 1),
-             static_cast<std::int64_t>(c + 1),
-             static_cast<std::int64_t>(g < burnIn ? 1 : 0),
-             static_cast<std::int64_t>(state.evaluation),
-             static_cast<std::int64_t>(state.accepted ? 1 : 0),
-             state.logLikelihood,
-             state.logPrior};
-      for (const double value : dimensions.shown(state.point)) row.emplace_back(value);
+      table.rows.push_back({static_cast<std::int64_t>(g + 1), static_cast<std::int64_t>(c + 1),
+                            static_cast<std::int64_t>(g < burnIn ? 1 : 0), static_cast<std::int64_t>(state.evaluation),
+                            static_cast<std::int64_t>(state.accepted ? 1 : 0)});
+      std::vector<double> values{state.logLikelihood, state.logPrior};
+      const std::vector<double> shown = dimensions.shown(state.point);
+      values.insert(values.end(), shown.begin(), shown.end());
+      for (std::size_t k = 0; k < values.size(); ++k) table.realColumns[k].push_back(values[k]);
     }
   }
   return table;

@@ -6,6 +6,7 @@
 #include "run/tasks/analysis_names.h"
 #include "run/tasks/distribution_reading.h"
 #include "run/tasks/posterior_bands.h"
+#include "run/tasks/sample_bands.h"
 
 namespace mirevo {
 namespace {
@@ -35,7 +36,14 @@ void DreamTask::read(const TaskReading& reading) {
   const SetupSection section = reading.target.open(kUncertaintySection);
   UncertaintySection filled{settings, randomSeed};
   section.read(uncertaintySection(), filled);
+  section.require(validateBandEnd(settings, reading.period));
   prior_ = readDistributions(reading, section);
+  if (const auto discrete = prior_.firstWithoutDensity()) {
+    section.refuse("Error: Prior of DREAM invalid", "Uncertainty_Type",
+                   fmt::format("the distribution of variable parameter {} has single values: expected one with a "
+                               "density, as chains move in small steps",
+                               *discrete + 1));
+  }
   readDreamSection(section, dream);
   dream.sampler.mostRuns = settings.sampleSize;
   constexpr std::int32_t kLeastGenerations = 10;
@@ -51,8 +59,7 @@ void DreamTask::read(const TaskReading& reading) {
 }
 
 std::optional<KeptSteps> DreamTask::keptSteps() const {
-  if (settings.bandTimes != BandTimes::steps) return std::nullopt;
-  return KeptSteps{settings.bandEnd};
+  return bandSteps(settings);
 }
 
 std::string DreamTask::description() const {
@@ -93,6 +100,7 @@ TaskOutcome DreamTask::outcomeOf(const TaskContext& context) const {
 TaskOutcome DreamTask::run(const TaskContext& context) {
   target_ = std::make_unique<DreamTarget>(dream, prior_, context);
   for (const std::string& line : target_->descriptionLines()) context.log.line(line);
+  logBandTimes(context, settings);
   sampler_ = std::make_unique<DreamSampler>(dream.sampler, target_->problem(context), randomSeed);
   bool wasBurningIn = true;
   std::size_t checks = 0;
