@@ -1,5 +1,6 @@
-/// Prints the tables of docs/algorithms/which-search.md. Usage: search_choice [table], where the table is "hard",
-/// "budgets", "surrogate", "noise" or "slots"; without an argument all of them.
+/// Prints the tables of docs/algorithms/which-search.md. Usage: search_choice [table], where the table is "budgets",
+/// "noise" or "slots", or one that the page does not have, "hard" (functions of the BBOB suite) or "surrogate"; without
+/// an argument all of them.
 
 #include <cstdio>
 #include <functional>
