@@ -49,7 +49,8 @@ const cases = {
   'a search': [sample.dataOf('optimisation'), 3 + 2 + 2 + 2 + 2, kOptimisation],
   'a search by few evaluations with two series': [sample.twoSeries(), 6 + 1 + 2 + 2 + 2,
     kOptimisation.filter((id) => id !== 'failures')],
-  'an uncertainty analysis': [sample.dataOf('uncertainty'), 1 + 3 + 1 + 5 + 2, ['band', 'series', 'parameters', 'results', 'compared', 'progress', 'distributions', 'dotty', 'failures', 'run', 'summary']],
+  'an uncertainty analysis': [sample.dataOf('uncertainty'), 1 + 2 + 3 + 1 + 5 + 2, ['band', 'sample-sensitivity', 'series', 'parameters', 'results', 'compared', 'progress', 'distributions', 'dotty', 'failures', 'run', 'summary']],
+  'GLUE': [sample.dataOf('glue'), 1 + 4 + 3 + 1 + 5 + 2, ['band', 'glue', 'series', 'parameters', 'results', 'compared', 'progress', 'distributions', 'dotty', 'failures', 'run', 'summary']],
   'a sensitivity analysis': [sample.dataOf('sensitivity'), 4 + 3, ['sensitivity', 'series', 'parameters', 'results', 'compared', 'run', 'summary']],
   'a Morris screening': [sample.dataOf('screening'), 4 + 3, ['morris', 'series', 'parameters', 'results', 'compared', 'run', 'summary']],
   'Sobol indices': [sample.dataOf('sobol'), 4 + 4 + 2, ['sobol', 'series', 'parameters', 'results', 'compared', 'progress', 'dotty', 'run', 'summary']],
@@ -58,7 +59,7 @@ const cases = {
   'a run without an evaluation': [sample.empty(), 0, ['run']],
   'a run whose evaluations all failed': [sample.dataOf('allFailed'), 0, ['parameters', 'results', 'failures', 'run', 'summary']],
   'a search with hostile names': [sample.hostile(sample.dataOf('optimisation')), 3 + 2 + 2 + 2 + 2, kOptimisation, true],
-  'an uncertainty analysis with hostile names': [sample.hostile(sample.dataOf('uncertainty')), 12, null, true],
+  'an uncertainty analysis with hostile names': [sample.hostile(sample.dataOf('uncertainty')), 14, null, true],
   'a Morris screening with hostile names': [sample.hostile(sample.dataOf('screening')), 7, null, true],
   'a sensitivity analysis with hostile names': [sample.hostile(sample.dataOf('sensitivity')), 7, null, true],
 };
@@ -255,6 +256,23 @@ test('a band breaks at its gaps, shows every observed value and says of how many
     const shown = await page.locator('#report').textContent();
     assert.ok(shown.includes('The quantiles are of 7 to 9 runs.'));
     assert.ok(!/best so far|Progress|A wider bound/.test(shown));
+  });
+});
+
+test('GLUE says which parameters the observations tell something of, and how much of them lies in how wide a band', async () => {
+  const data = sample.dataOf('glue');
+  data.glue.parameters[0].distance = 0.5;
+  data.glue.parameters[1].distance = 0.01;
+  Object.assign(data.band[0], { inside: 0.75, n: 365, width: 2.5, relativeWidth: 0.8, unit: 'm3/s' });
+  await withReport(data, {}, async (page) => {
+    const shown = await page.locator('#glue').textContent();
+    assert.ok(shown.includes('The observations tell something of a (the most first). Behavioural values of b are distributed as all sets are'), shown);
+    assert.ok((await page.locator('#band').textContent()).includes('It is 2.5 m3/s wide on average at them, 0.8 of their standard deviation.'));
+  });
+  Object.assign(data.glue, { effective: 0, behavioural: 0, distanceLimit: null });
+  await withReport(data, {}, async (page) => {
+    assert.equal(await page.locator('#glue figure').count(), 0);
+    assert.ok((await page.locator('#glue').textContent()).includes('neither quantiles nor bands'));
   });
 });
 
