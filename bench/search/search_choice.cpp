@@ -1,5 +1,5 @@
-/// Prints the tables of docs/algorithms/which-search.md. Usage: search_choice [table], where the table is "budgets",
-/// "noise" or "slots", or one that the page does not have, "hard" (functions of the BBOB suite) or "surrogate"; without
+/// Prints the tables of docs/algorithms/which-search.md. Usage: search_choice [table], where the table is "hard"
+/// (functions of the BBOB suite), "budgets", "noise" or "slots", or "surrogate", which the page does not have; without
 /// an argument all of them.
 
 #include <cstdio>
