@@ -1,5 +1,6 @@
-/// Prints the tables of docs/algorithms/which-search.md. Usage: search_choice [table], where the table is "hard",
-/// "budgets", "surrogate", "noise" or "slots"; without an argument all of them.
+/// Prints the tables of docs/algorithms/which-search.md. Usage: search_choice [table], where the table is "hard"
+/// (functions of the BBOB suite), "budgets", "noise" or "slots", or "surrogate", which the page does not have; without
+/// an argument all of them.
 
 #include <cstdio>
 #include <functional>

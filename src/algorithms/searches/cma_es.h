@@ -28,9 +28,10 @@ struct CmaEsSettings {
 /// outside the bounds; see the classes whose names begin with Cma. A loop is one generation, all of it one batch.
 ///
 /// It works in the unit cube of the bounds. What the publications leave open: the first run starts at a
-/// given set if it is the best of the initial sample, else at the mean of the better half, weighted as parents are; failed points rank behind all others, and of two the one nearer to the mean is the better one,
-/// so that steps become smaller where all fail; a point that violates a constraint is drawn again and finally drawn
-/// back towards the mean; differences of values are negligible in relation to the values.
+/// given set if it is the best of the initial sample, else at the mean of the better half, weighted as parents are;
+/// failed points rank behind all others, and of two the one nearer to the mean is the better one, so that steps become
+/// smaller where all fail; a point that violates a constraint is drawn again and finally drawn back towards the mean;
+/// differences of values are negligible in relation to the values.
 class CmaEs final : public SearchAlgorithm {
  public:
   CmaEs(const CmaEsSettings& settings, SearchProblem problem);
