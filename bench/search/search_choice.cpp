@@ -72,13 +72,14 @@ void printHead(const std::string& first, const std::vector<Search>& columns) {
   fmt::print("\n");
 }
 
-/// A row of medians; with the successes and mean evaluations behind it if there are any.
-void printRow(const std::string& name, const Case& function, const std::vector<Search>& columns, int trials) {
+/// A row of medians; with the successes and mean evaluations behind it if there are any, which no time limits.
+void printRow(const std::string& name, const Case& function, const std::vector<Search>& columns, int trials,
+              bool isTimed = false) {
   fmt::print("| {} |", name);
   for (const Search& search : columns) {
     const std::vector<Outcome> outcomes = runTrials(function.make, search.setting, trials);
     const std::string successes = successText(outcomes);
-    fmt::print(" {:.2g}{} |", medianOf(outcomes), successes.starts_with("0/") ? "" : " (" + successes + ")");
+    fmt::print(" {:.2g}{} |", medianOf(outcomes), isTimed || successes.starts_with("0/") ? "" : " (" + successes + ")");
   }
   fmt::print("\n");
   std::fflush(stdout);
@@ -163,7 +164,7 @@ void printSlots() {
     }
     printHead("function", columns);
     for (const Case& function : functionsOf(10)) {
-      printRow(fmt::format("{} 10-D", function.name), function, columns, kTrials);
+      printRow(fmt::format("{} 10-D", function.name), function, columns, kTrials, true);
     }
   }
 }

@@ -40,7 +40,8 @@ pygments_dark_style = "native"
 REFERENCE = "docs/setup-reference"
 # Pages that mention keywords without explaining them.
 NOT_EXPLAINING = ("index", "docs/README", "docs/tutorial", "docs/coming-from", "docs/troubleshooting", "docs/glossary",
-                  "docs/architecture", "docs/examples/", "docs/algorithms/search-comparison", "examples/", "CHANGELOG",
+                  "docs/architecture", "docs/examples/", "docs/algorithms/search-comparison", "docs/algorithms/which-search",
+                  "examples/", "CHANGELOG",
                   "CONTRIBUTING", REFERENCE)
 # The pages that sections and keywords have of their own. Other pages that explain a keyword are found by its mentions.
 MODEL_FOLDER = "docs/file-formats#where-the-model-is-kept-and-where-it-runs"
@@ -57,7 +58,7 @@ SECTION_PAGES = {
     "SAVE_OUTPUT_FILES": "docs/file-formats#results",
     "SCENARIOS": "docs/scenarios",
     "SENSITIVITY_ANALYSIS": "docs/sensitivity",
-    "OPTIMISATION_ALGORITHM": "docs/algorithms/search-comparison",
+    "OPTIMISATION_ALGORITHM": "docs/algorithms/which-search",
     "SCE_CONTROL_PARAMETERS": "docs/algorithms/sce",
     "PSE_CONTROL_PARAMETERS": "docs/algorithms/pse",
     "DDS_CONTROL_PARAMETERS": "docs/algorithms/dds",
@@ -69,7 +70,7 @@ SECTION_PAGES = {
 }
 KEYWORD_PAGES = {
     "Option": "docs/README#tasks",
-    "Algorithm_Type": "docs/algorithms/search-comparison",
+    "Algorithm_Type": "docs/algorithms/which-search",
     "Restart": "docs/restart",
     "FailedRunFolders": "docs/restart#models-that-fail",
     "Report": "docs/report",

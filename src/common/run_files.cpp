@@ -7,9 +7,9 @@ namespace {
 
 std::vector<RunFile> filesOfSetup() {
   using namespace run_files;
-  std::vector<RunFile> files{kLog,     kTerminationLog, kMessages,      kKill,           kSeries,
-                             kReport,  kBand,           kSavedFolder,   kFailedFolder,   kProcessFolder,
-                             kRunLock, kProcessLock,    kOwnFailedRuns, kScenarioSeries, kSobolSeries};
+  std::vector<RunFile> files{kLog,           kTerminationLog, kMessages,     kKill,          kSeries,  kReport,
+                             kBand,          kSavedFolder,    kFailedFolder, kProcessFolder, kRunLock, kProcessLock,
+                             kOwnFailedRuns, kScenarioSeries, kSobolSeries,  kTotalBand};
   for (const ResultFileNames& names : {kPlain, kSensitivity, kOptimisation}) {
     files.insert(files.end(), {names.results, names.restart, names.simulatedValues, names.record, names.failures,
                                names.pairs, names.checksums, names.unkept});

@@ -49,6 +49,9 @@ inline constexpr RunFile kReport{
 inline constexpr RunFile kBand{.stem = "_Band_", .extension = ".csv", .isNumbered = true, .mark = "# Band of "};
 inline constexpr RunFile kSobolSeries{
     .stem = "_SobolSeries_", .extension = ".csv", .isNumbered = true, .mark = "# Sobol' indices of "};
+/// Beside a band of the simulated values: that of what would be observed, with the errors.
+inline constexpr RunFile kTotalBand{
+    .stem = "_TotalBand_", .extension = ".csv", .isNumbered = true, .mark = "# Band of "};
 inline constexpr RunFile kSavedFolder{"_Saved", ""};
 /// These two stand beside the setup, or in the folder that it names for them.
 inline constexpr RunFile kFailedFolder{"_Failed", "", true};
@@ -70,9 +73,14 @@ inline constexpr RunFile kSensitivities{"_Sensitivities", ".dat", false, true};
 inline constexpr RunFile kMorris{"_Morris", ".dat", false, true};
 inline constexpr RunFile kQuantiles{"_Quantiles", ".dat", false, true};
 inline constexpr RunFile kSampleCorrelation{"_SampleCorrelation", ".dat", false, true};
+inline constexpr RunFile kChains{"_Chains", ".dat", false, true};
+inline constexpr RunFile kPosterior{"_Posterior", ".dat", false, true};
+inline constexpr RunFile kMarginals{"_Marginals", ".dat", false, true};
+inline constexpr RunFile kConvergence{"_Convergence", ".dat", false, true};
 inline constexpr RunFile kSampleSensitivities{"_SampleSensitivities", ".dat", false, true};
 inline constexpr RunFile kGlue{"_Glue", ".dat", false, true};
-inline constexpr std::array kUncertaintyTables{kQuantiles, kSampleCorrelation, kSampleSensitivities, kGlue};
+inline constexpr std::array kUncertaintyTables{kQuantiles, kSampleCorrelation, kSampleSensitivities, kGlue,
+                                               kChains,    kPosterior,         kMarginals,           kConvergence};
 inline constexpr RunFile kSobol{"_Sobol", ".dat", false, true};
 inline constexpr RunFile kSobolConvergence{"_SobolConvergence", ".dat", false, true};
 inline constexpr std::array kSensitivityTables{kCovariance,    kCorrelation, kParameterLimits, kJacobian,

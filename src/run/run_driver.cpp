@@ -376,8 +376,9 @@ void RunDriver::writeFiles(std::span<const TaskFile> files) {
 std::optional<TaskOutcome> RunDriver::statisticsOfEarlyEnd() {
   if (outcome_ || !evaluator_ || !config_.task) return outcome_;
   const UnfinishedBatch made = evaluator_->takeUnfinished();
-  const auto succeeded =
+  const auto ofBatch =
       std::count_if(made.results.begin(), made.results.end(), [](const auto& result) { return result.ok(); });
+  const auto succeeded = config_.task->evaluationsInBatches().value_or(static_cast<int>(ofBatch));
   if (succeeded == 0) return std::nullopt;
   auto outcome = config_.task->unfinishedOutcome(taskContext(), made);
   if (!outcome) return std::nullopt;

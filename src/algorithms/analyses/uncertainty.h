@@ -23,7 +23,8 @@ namespace mirevo {
 
 enum class SamplingType : std::int32_t { simpleRandom = 0, latinHypercube = 1 };
 /// The forms of the uncertainty analysis; those that do not sample independently have a name only.
-inline constexpr CodeName kSamplingTypeNames[] = {{0, "simple random"}, {1, "Latin hypercube"}, {std::nullopt, "GLUE"}};
+inline constexpr CodeName kSamplingTypeNames[] = {
+    {0, "simple random"}, {1, "Latin hypercube"}, {std::nullopt, "GLUE"}, {std::nullopt, "DREAM"}};
 
 /// At which times the bands of simulated series are made. Without codes: names only, in the order of the enumerators.
 enum class BandTimes : std::int32_t { observations, steps };

@@ -144,6 +144,7 @@ SearchStatus CmaEs::advance() {
   const bool isCut = count < points.size();
   points.resize(count);
   std::vector<ParameterSet> sets;
+  sets.reserve(points.size());
   for (const Point& point : points) sets.push_back(point.set);
   std::vector<EvaluationResult> results = run(sets);
   for (std::size_t i = 0; i < count; ++i) {
@@ -203,6 +204,7 @@ void CmaEs::learnFrom(std::vector<Point>& points) {
   }
   std::stable_sort(points.begin(), points.end(), [this](const Point& a, const Point& b) { return isAhead(a, b); });
   std::vector<const std::vector<double>*> steps;
+  steps.reserve(points.size());
   for (const Point& point : points) steps.push_back(&point.step);
   distribution_->update(steps);
   const Point& early = points[static_cast<std::size_t>(0.7 * static_cast<double>(points.size()))];

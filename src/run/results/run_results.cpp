@@ -43,9 +43,10 @@ const ResultFileNames& namesOf(const RunConfig& config) {
   return config.task ? config.task->facts().resultFiles : run_files::kPlain;
 }
 
-/// The files of series that analyses write, a number each: bands, or Sobol' indices.
-const RunFile& seriesFileOf(const ResultFileNames& names) {
-  return names.results == run_files::kSensitivity.results ? run_files::kSobolSeries : run_files::kBand;
+/// The files of series that analyses write, a number each: bands, or Sobol' indices. All of a task have the same mark.
+std::vector<RunFile> seriesFilesOf(const ResultFileNames& names) {
+  if (names.results == run_files::kSensitivity.results) return {run_files::kSobolSeries};
+  return {run_files::kBand, run_files::kTotalBand};
 }
 
 }  // namespace
@@ -128,9 +129,11 @@ void RunResults::warnOfLostRows(RunLog& log) const {
 
 std::vector<std::string> RunResults::seriesPaths(const RunConfig& config) const {
   const TaskReport task = config.task->report();
-  std::vector<std::string> paths(task.hasBands || task.sobol != nullptr ? config.measures.size() : 0);
-  int number = 0;
-  for (std::string& path : paths) path = runFilePath(filePrefix_, seriesFileOf(names_), ++number);
+  const int count = task.hasBands || task.sobol != nullptr ? static_cast<int>(config.measures.size()) : 0;
+  std::vector<std::string> paths;
+  for (const RunFile& file : seriesFilesOf(names_)) {
+    for (int number = 1; number <= count; ++number) paths.push_back(runFilePath(filePrefix_, file, number));
+  }
   return paths;
 }
 
@@ -150,7 +153,7 @@ void RunResults::requireReplaceableFiles(const RunConfig& config) const {
   files.insert(files.end(), names_.tables.begin(), names_.tables.end());
   for (const RunFile& file : files) requireReplaceable(runFilePath(filePrefix_, file), file);
   requireReplaceable(pathBeside(filePrefix_, run_files::kFailedRuns), run_files::kFailedRuns);
-  for (const std::string& path : seriesPaths(config)) requireReplaceable(path, seriesFileOf(names_));
+  for (const std::string& path : seriesPaths(config)) requireReplaceable(path, seriesFilesOf(names_).front());
 }
 
 /// `calSimErr.dat` is one per folder, and runs of several setups may be going on in it.
@@ -186,12 +189,13 @@ void RunResults::writeTables(std::span<const DataTable> tables, RunLog& log) con
 /// Those of every measure that earlier runs had.
 std::vector<std::string> RunResults::earlierSeries(RunLog& log) const {
   std::vector<std::string> paths;
-  const RunFile& file = seriesFileOf(names_);
-  for (const auto& [path, digits] : numberedEntries(runFilePath(filePrefix_, file), file.extension)) {
-    std::string reason;
-    const auto head = readFileHead(path, reason);
-    if (!head) log.warning(fmt::format("{}: {}. It may be of an earlier run, and is not kept", path, reason));
-    if (head && head->starts_with(file.mark)) paths.push_back(path);
+  for (const RunFile& file : seriesFilesOf(names_)) {
+    for (const auto& [path, digits] : numberedEntries(runFilePath(filePrefix_, file), file.extension)) {
+      std::string reason;
+      const auto head = readFileHead(path, reason);
+      if (!head) log.warning(fmt::format("{}: {}. It may be of an earlier run, and is not kept", path, reason));
+      if (head && head->starts_with(file.mark)) paths.push_back(path);
+    }
   }
   std::sort(paths.begin(), paths.end());
   return paths;

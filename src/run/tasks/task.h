@@ -201,6 +201,9 @@ class Task {
     return std::nullopt;
   }
 
+  /// Of a task whose unfinishedOutcome() is of batches that came to their end alone, how many evaluations these are.
+  virtual std::optional<int> evaluationsInBatches() const { return std::nullopt; }
+
   virtual TaskReport report() const { return {}; }
 
   /// For a search, what becomes of an earlier one with a smaller budget; empty if the budget was not raised.

@@ -1,5 +1,6 @@
 #include "run/tasks/tasks.h"
 
+#include "run/tasks/dream_task.h"
 #include "run/tasks/glue_task.h"
 #include "run/tasks/morris_task.h"
 #include "run/tasks/optimisation_task.h"
@@ -28,7 +29,7 @@ const ChoiceTable<Task>& tasks() {
 
 std::vector<std::unique_ptr<Task>> furtherTaskForms() {
   /// A new form of a task is added here, and its name to the codes of the keyword that selects it.
-  return oneOfEach<MorrisTask, SobolTask, GlueTask>();
+  return oneOfEach<MorrisTask, SobolTask, GlueTask, DreamTask>();
 }
 
 std::unique_ptr<Task> selectedForm(const Task& task, const SetupSection& target) {

@@ -6,20 +6,16 @@
 #include <gtest/gtest.h>
 
 #include "algorithms/numbers/uniform_generator.h"
+#include "algorithms/sobol_functions.h"
 #include "matchers.h"
 
 namespace mirevo {
 namespace {
 
-using Function = double (*)(const ParameterSet&);
+using OutputFunction = std::function<double(std::span<const double>)>;
 
-/// Ishigami and Homma (1990) with a = 7, b = 0.1.
-double ishigami(const ParameterSet& x) {
-  return std::sin(x[0]) + 7 * std::pow(std::sin(x[1]), 2) + 0.1 * std::pow(x[2], 4) * std::sin(x[0]);
-}
-
-SearchSpace spaceOf(std::size_t p, double lower, double upper,
-                    TransformationType transformation = TransformationType::none) {
+SearchSpace spaceBetween(std::size_t p, double lower, double upper,
+                         TransformationType transformation = TransformationType::none) {
   SearchSpace space;
   for (std::size_t j = 0; j < p; ++j) {
     space.names.push_back(std::string(1, static_cast<char>('a' + j)));
@@ -31,7 +27,8 @@ SearchSpace spaceOf(std::size_t p, double lower, double upper,
 }
 
 /// Uniform samples of the space; every `failing`-th run has failed.
-UncertaintyOutcome sampled(const SearchSpace& space, int count, Function function, int seed, int failing = 0) {
+UncertaintyOutcome sampleOf(const SearchSpace& space, int count, const OutputFunction& function, int seed,
+                            int failing = 0) {
   UncertaintyOutcome outcome{
       uncertaintySample({SamplingType::simpleRandom, count, ParameterDistributions::uniform(space)}, seed), {}};
   for (int i = 0; i < count; ++i) {
@@ -44,13 +41,14 @@ UncertaintyOutcome sampled(const SearchSpace& space, int count, Function functio
   return outcome;
 }
 
-const AnalysisNames kNames{{"a", "b", "c"}, {}, {"fit"}};
+const AnalysisNames kNamesOfSample{{"a", "b", "c"}, {}, {"fit"}};
 
 TEST(SampleSensitivity, FindsPublishedIndicesAlsoWithFailedRuns) {
-  const SearchSpace space = spaceOf(3, -M_PI, M_PI);
-  const double published[] = {0.3139, 0.4424, 0.0};  // Saltelli et al. (2008), Global Sensitivity Analysis, p. 179
+  const SearchSpace space = spaceBetween(3, 0, 1);
+  const std::vector<double> published = ishigami().first;
   for (const int failing : {0, 10}) {
-    const SampleSensitivity found = sampleSensitivity(sampled(space, 5000, ishigami, 3, failing), space, kNames, 3);
+    const SampleSensitivity found =
+        sampleSensitivity(sampleOf(space, 5000, ishigami().value, 3, failing), space, kNamesOfSample, 3);
     ASSERT_EQ(found.outputs.size(), 1U);
     EXPECT_EQ(found.failedCount, failing == 0 ? 0U : 500U);
     EXPECT_EQ(found.outputs[0].count, 5000 - found.failedCount);
@@ -66,14 +64,14 @@ TEST(SampleSensitivity, FindsPublishedIndicesAlsoWithFailedRuns) {
 
 /// What has no effect is 0 on average: without the correction it would be 6 / 199.
 TEST(SampleSensitivity, HasNoBiasWithoutAnEffect) {
-  const SearchSpace space = spaceOf(2, 0, 1);
+  const SearchSpace space = spaceBetween(2, 0, 1);
   double sum = 0.0;
   int negative = 0;
   constexpr int kSamples = 60;
   for (int seed = 1; seed <= kSamples; ++seed) {
-    const auto outcome = sampled(
-        space, 200, [](const ParameterSet& x) { return x[0]; }, seed);
-    const SampleSensitivity found = sampleSensitivity(outcome, space, kNames, seed);
+    const auto outcome = sampleOf(
+        space, 200, [](std::span<const double> x) { return x[0]; }, seed);
+    const SampleSensitivity found = sampleSensitivity(outcome, space, kNamesOfSample, seed);
     EXPECT_GT(found.outputs[0].parameters[0].firstOrder, 0.99);
     sum += found.outputs[0].parameters[1].firstOrder;
     negative += found.outputs[0].parameters[1].firstOrder < 0.0 ? 1 : 0;
@@ -84,21 +82,21 @@ TEST(SampleSensitivity, HasNoBiasWithoutAnEffect) {
 
 TEST(SampleSensitivity, OfFewValuesIsThatOfTheirClasses) {
   // b is 0 or 1 with equal probability: the variance of 2 b + u - 1/2 is 1 + 1/12, of which b explains 1.
-  const SearchSpace space = spaceOf(2, 0, 2, TransformationType::integer);
-  UncertaintyOutcome outcome = sampled(
-      space, 3000, [](const ParameterSet& x) { return x[0]; }, 8);
+  const SearchSpace space = spaceBetween(2, 0, 2, TransformationType::integer);
+  UncertaintyOutcome outcome = sampleOf(
+      space, 3000, [](std::span<const double> x) { return x[0]; }, 8);
   UniformGenerator random(5);
   for (std::size_t i = 0; i < outcome.results.size(); ++i) {
     outcome.results[i].objectiveValues = {2 * std::floor(outcome.sample[i][1]) + random.next()};
   }
-  const SampleSensitivity found = sampleSensitivity(outcome, space, kNames, 1);
+  const SampleSensitivity found = sampleSensitivity(outcome, space, kNamesOfSample, 1);
   EXPECT_NEAR(found.outputs[0].parameters[1].firstOrder, 12.0 / 13.0, 0.01);
   EXPECT_NEAR(found.outputs[0].parameters[0].firstOrder, 0.0, 0.005);
   EXPECT_NEAR(found.outputs[0].parameters[1].rankCorrelation, std::sqrt(0.75), 0.01);
 }
 
 TEST(SampleSensitivity, RankCorrelationIsThatOfRanksWithTies) {
-  const SearchSpace space = spaceOf(1, 0, 10);
+  const SearchSpace space = spaceBetween(1, 0, 10);
   UncertaintyOutcome outcome;
   const double pairs[][2] = {{1, 5}, {2, 6}, {2, 7}, {4, 8}, {5, 7}, {9, kFailedRunValue}};
   for (const auto& [x, y] : pairs) {
@@ -124,10 +122,11 @@ TEST(SampleSensitivity, RankCorrelationIsThatOfRanksWithTies) {
 }
 
 TEST(SampleSensitivity, SaysWhatIsNegligibleAndWhenTheSampleIsSmall) {
-  const SearchSpace space = spaceOf(3, -M_PI, M_PI);
+  const SearchSpace space = spaceBetween(3, 0, 1);
   const auto lines = [&](int count) {
-    const SampleSensitivity found = sampleSensitivity(sampled(space, count, ishigami, 3), space, kNames, 3);
-    return formatSampleSensitivity(found, kNames, "x.dat", false);
+    const SampleSensitivity found =
+        sampleSensitivity(sampleOf(space, count, ishigami().value, 3), space, kNamesOfSample, 3);
+    return formatSampleSensitivity(found, kNamesOfSample, "x.dat", false);
   };
   EXPECT_THAT(lines(5000), AllOf(Contains(HasSubstr("Less than 0.05 of the variance each, by themselves: c; ")),
                                  Not(Contains(HasSubstr("The sample is small")))));

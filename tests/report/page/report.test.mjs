@@ -49,7 +49,7 @@ const cases = {
   'a search': [sample.dataOf('optimisation'), 3 + 2 + 2 + 2 + 2, kOptimisation],
   'a search by few evaluations with two series': [sample.twoSeries(), 6 + 1 + 2 + 2 + 2,
     kOptimisation.filter((id) => id !== 'failures')],
-  'an uncertainty analysis': [sample.dataOf('uncertainty'), 1 + 3 + 1 + 5 + 2, ['band', 'series', 'parameters', 'results', 'compared', 'progress', 'distributions', 'dotty', 'failures', 'run', 'summary']],
+  'an uncertainty analysis': [sample.dataOf('uncertainty'), 1 + 2 + 3 + 1 + 5 + 2, ['band', 'sample-sensitivity', 'series', 'parameters', 'results', 'compared', 'progress', 'distributions', 'dotty', 'failures', 'run', 'summary']],
   'GLUE': [sample.dataOf('glue'), 1 + 4 + 3 + 1 + 5 + 2, ['band', 'glue', 'series', 'parameters', 'results', 'compared', 'progress', 'distributions', 'dotty', 'failures', 'run', 'summary']],
   'a sensitivity analysis': [sample.dataOf('sensitivity'), 4 + 3, ['sensitivity', 'series', 'parameters', 'results', 'compared', 'run', 'summary']],
   'a Morris screening': [sample.dataOf('screening'), 4 + 3, ['morris', 'series', 'parameters', 'results', 'compared', 'run', 'summary']],
@@ -59,7 +59,7 @@ const cases = {
   'a run without an evaluation': [sample.empty(), 0, ['run']],
   'a run whose evaluations all failed': [sample.dataOf('allFailed'), 0, ['parameters', 'results', 'failures', 'run', 'summary']],
   'a search with hostile names': [sample.hostile(sample.dataOf('optimisation')), 3 + 2 + 2 + 2 + 2, kOptimisation, true],
-  'an uncertainty analysis with hostile names': [sample.hostile(sample.dataOf('uncertainty')), 12, null, true],
+  'an uncertainty analysis with hostile names': [sample.hostile(sample.dataOf('uncertainty')), 14, null, true],
   'a Morris screening with hostile names': [sample.hostile(sample.dataOf('screening')), 7, null, true],
   'a sensitivity analysis with hostile names': [sample.hostile(sample.dataOf('sensitivity')), 7, null, true],
 };

@@ -8,7 +8,7 @@ int main(int argc, char** argv) {
   const std::pair<std::string, RunSettings> samples[] = {
       {"optimisation", {.algorithm = 0, .maxEvaluations = 120, .modelArguments = "--fail-above 9"}},
       {"short", {.maxEvaluations = 12}},
-      {"uncertainty", {.option = 3, .maxEvaluations = 60, .modelArguments = "--fail-above 6"}},
+      {"uncertainty", {.option = 3, .maxEvaluations = 120, .modelArguments = "--fail-above 6"}},
       {"glue", {.option = 3, .maxEvaluations = 120, .modelArguments = "--fail-above 9.5"}},
       {"sensitivity", {.option = 1}},
       {"screening", {.option = 1}},

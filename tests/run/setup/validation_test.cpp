@@ -370,10 +370,11 @@ std::vector<RowInSetup> rowsInSetups(const std::string& setup) {
       text = SetupFixture::withValue(text, "SimultaneousSimulations", "NoSimultaneousSim", "1");
     }
     for (const auto& [name, form, needed] : kForms) {
-      if (section->path != fmt::format("SENSITIVITY_ANALYSIS/{}", name)) continue;
-      text = SetupFixture::withValue(text, "SENSITIVITY_ANALYSIS", "Sensitivity_Type", form);
+      if (!section->path.starts_with("SENSITIVITY_ANALYSIS")) continue;
       const std::string end = "[/LOCAL_SA]\n";
       text.insert(text.find(end) + end.size(), fmt::format("[{0}]\n{1}[/{0}]\n", name, needed));
+      if (section->path != fmt::format("SENSITIVITY_ANALYSIS/{}", name)) continue;
+      text = SetupFixture::withValue(text, "SENSITIVITY_ANALYSIS", "Sensitivity_Type", form);
     }
     for (const KeywordRow& row : section->keywords) {
       if (row.store != nullptr) found.push_back({section, &row, text});

@@ -98,7 +98,7 @@ TEST_F(DistributionReading, RefusesWhatCannotBe) {
       {"Mean_Value = 1", "Unable to read keyword", "Standard_Deviation: the keyword is missing"},
       {"Mean_Value = 1\nStandard_Deviation = 0", "Standard deviation in uncertainty estimation invalid", ""},
       {"Distribution = 'uniform'", "Scale of the distribution missing",
-       "setup.kdx:174:5: Distribution_Scale: expected 'model' or 'search', as Rate is logarithmic"},
+       "Distribution_Scale: expected 'model' or 'search', as Rate is logarithmic"},
       {"Mean_Value = 1\nStandard_Deviation = 1" + model,
        "Distribution of a logarithmic parameter has values that are not above 0", "expected 'truncated normal'"},
       {"Distribution = 'beta'\nAlpha = 1" + model, "Unable to read keyword", "Beta: the keyword is missing"},

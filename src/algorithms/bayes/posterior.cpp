@@ -1,0 +1,322 @@
+#include "algorithms/bayes/posterior.h"
+
+#include <algorithm>
+#include <cmath>
+#include <cstdint>
+#include <limits>
+
+#include <fmt/format.h>
+
+#include "algorithms/numbers/sample_summary.h"
+#include "common/run_files.h"
+#include "common/text.h"
+
+namespace mirevo {
+namespace {
+
+constexpr double kTradeOff = 0.7;  // correlation from which two parameters are said to trade off
+constexpr std::size_t kBins = 40;
+
+/// Calls `take(state)` for each state behind burn-in.
+template <class Take>
+void forPosterior(const DreamSampler& sampler, const Take& take) {
+  const ChainHistory& history = sampler.history();
+  for (std::size_t g = sampler.burnIn().value_or(history.generations()); g < history.generations(); ++g) {
+    for (std::size_t c = 0; c < history.chainCount(); ++c) take(history.at(g, c));
+  }
+}
+
+std::vector<std::vector<double>> shownColumns(const ShownDimensions& dimensions,
+                                              std::span<const std::vector<double>> points) {
+  std::vector<std::vector<double>> columns(dimensions.names.size());
+  for (const std::vector<double>& point : points) {
+    const std::vector<double> values = dimensions.shown(point);
+    for (std::size_t j = 0; j < columns.size(); ++j) columns[j].push_back(values[j]);
+  }
+  return columns;
+}
+
+std::vector<double> quantilesOf(std::span<const double> values) {
+  const SampleSummary summary = summariseSample(values);
+  return {summary.quantiles.begin(), summary.quantiles.end()};
+}
+
+std::string percent(double share) {
+  return fmt::format("{:.1f} %", 100.0 * share);
+}
+
+std::string endText(const DreamSettings& settings, DreamEnd end) {
+  switch (end) {
+    case DreamEnd::converged:
+      return fmt::format("The chains ended as R-hat is at most {:g} and the effective sample size at least {:g}",
+                         settings.rHatLimit, settings.effectiveSize);
+    case DreamEnd::budget:
+      return fmt::format("The chains ended with their {} model runs", settings.mostRuns);
+    case DreamEnd::generations:
+      return "The chains ended as most proposals need no model run: they lie outside the bounds or the prior, violate "
+             "constraints, or change parameters of the error model alone";
+    case DreamEnd::none:
+      break;
+  }
+  return "The chains were interrupted";
+}
+
+/// Whether the chains agree, and what to do where they do not.
+void appendConvergence(const DreamSettings& settings, const ShownDimensions& dimensions,
+                       const PosteriorSummary& summary, std::vector<std::string>& lines) {
+  std::string apart;
+  std::string few;
+  for (std::size_t j = 0; j < dimensions.names.size(); ++j) {
+    const PosteriorSummary::Dimension& own = summary.dimensions[j];
+    if (!(own.rHat <= settings.rHatLimit)) {
+      apart += fmt::format("{}{} ({:.3g})", apart.empty() ? "" : ", ", dimensions.names[j], own.rHat);
+    } else if (!(own.effectiveSize >= settings.effectiveSize)) {
+      few += fmt::format("{}{} ({:.0f})", few.empty() ? "" : ", ", dimensions.names[j], own.effectiveSize);
+    }
+  }
+  if (apart.empty() && few.empty()) {
+    lines.emplace_back("The chains have converged, as far as R-hat and the effective sample sizes tell");
+    return;
+  }
+  if (!apart.empty()) {
+    lines.push_back(fmt::format(
+        "Warning: The chains have not converged: R-hat is above {:g} for {}. The quantiles below are not those of the "
+        "posterior yet. Raise Sample_Size; where R-hat stays large, the posterior may have several peaks (more chains "
+        "help: Chain_Count) or burn-in is too short (Burn_In_Share), which the traces of the report show",
+        settings.rHatLimit, apart));
+  }
+  if (!few.empty()) {
+    lines.push_back(fmt::format(
+        "Warning: The chains agree, but the effective sample size is below {:g} for {}: means are known to about a "
+        "standard deviation divided by its square root, the 5 and 95 % quantiles less well. Raise Sample_Size",
+        settings.effectiveSize, few));
+  }
+}
+
+void appendCounts(const DreamSampler& sampler, std::vector<std::string>& lines) {
+  const DreamCounts& parallel = sampler.parallelCounts();
+  const DreamCounts& snooker = sampler.snookerCounts();
+  const DreamCounts all{parallel.proposals + snooker.proposals, parallel.accepted + snooker.accepted};
+  lines.push_back(
+      fmt::format("Acceptance rate behind burn-in: {} of {} proposals ({} of parallel-direction updates, {} "
+                  "of snooker updates)",
+                  percent(all.rate()), all.proposals, percent(parallel.rate()), percent(snooker.rate())));
+  if (all.proposals > 0 && all.rate() < 0.05) {
+    lines.emplace_back(
+        "Warning: Few proposals are accepted: the chains mix slowly. Bounds far wider than the posterior, a posterior "
+        "at a bound, a likelihood far too sharp (a fixed Error_Deviation that is too small) or rough results of the "
+        "model are usual reasons");
+  }
+  if (sampler.outlierCount() > 0) {
+    lines.push_back(fmt::format("{} during burn-in: each went on from the state of the best chain",
+                                countText(static_cast<std::size_t>(sampler.outlierCount()), "outlier chain")));
+  }
+}
+
+void appendQuantiles(const ShownDimensions& dimensions, const PosteriorSummary& summary,
+                     std::vector<std::string>& lines) {
+  std::vector<std::string> headings{"Mean", "Std. deviation"};
+  for (const double p : kSummaryProbabilities) headings.push_back(fmt::format("{:g} %", 100.0 * p));
+  headings.insert(headings.end(), {"Most probable", "R-hat", "Eff. size"});
+  std::vector<std::vector<double>> rows;
+  for (std::size_t j = 0; j < dimensions.names.size(); ++j) {
+    const PosteriorSummary::Dimension& own = summary.dimensions[j];
+    std::vector<double>& row = rows.emplace_back(std::vector<double>{own.mean, own.standardDeviation});
+    row.insert(row.end(), own.quantiles.begin(), own.quantiles.end());
+    row.insert(row.end(), {summary.mostProbable[j], own.rHat, std::round(own.effectiveSize)});
+  }
+  lines.emplace_back();
+  for (std::string& line : formatTable("Posterior", headings, dimensions.names, rows)) lines.push_back(std::move(line));
+  lines.push_back(fmt::format("The most probable state is that of evaluation {}", summary.mostProbableRun));
+}
+
+void appendTradeOffs(const ShownDimensions& dimensions, const PosteriorSummary& summary,
+                     std::string_view correlationFile, std::vector<std::string>& lines) {
+  const auto& matrix = summary.correlations;
+  for (const auto& [i, j] : largestEntries(matrix)) {
+    if (std::abs(matrix[i][j]) < kTradeOff) continue;
+    lines.push_back(
+        fmt::format("{} and {} trade off: a correlation of {:.2f}. The data know a combination of them "
+                    "better than either",
+                    dimensions.names[i], dimensions.names[j], matrix[i][j]));
+  }
+  // The 90 % ranges on the shown scale: that of the posterior as a part of that of the prior.
+  for (std::size_t j = 0; j < dimensions.modelParameterCount; ++j) {
+    const PosteriorSummary::Dimension& own = summary.dimensions[j];
+    const double before = own.priorQuantiles.back() - own.priorQuantiles.front();
+    const double after = own.quantiles.back() - own.quantiles.front();
+    if (before > 0.0 && after > 0.9 * before) {
+      lines.push_back(fmt::format("{}: the data say little of it, its posterior is hardly narrower than its prior",
+                                  dimensions.names[j]));
+    }
+  }
+  lines.emplace_back();
+  for (std::string& line : formatCorrelation("Correlation", dimensions.names, matrix, correlationFile)) {
+    lines.push_back(std::move(line));
+  }
+}
+
+}  // namespace
+
+std::optional<PosteriorSummary> summarisePosterior(const DreamSampler& sampler, const ShownDimensions& dimensions,
+                                                   std::span<const std::vector<double>> priorDraws) {
+  const auto check = sampler.checkNow();
+  if (!check) return std::nullopt;
+  PosteriorSummary summary;
+  std::vector<std::vector<double>> rows;
+  double largest = -std::numeric_limits<double>::infinity();
+  forPosterior(sampler, [&](const ChainHistory::State& state) {
+    rows.push_back(dimensions.shown(state.point));
+    const double density = state.logLikelihood + state.logPrior;
+    if (!summary.mostProbable.empty() && !(density > largest)) return;
+    largest = density;
+    summary.mostProbable = rows.back();
+    summary.mostProbableRun = state.evaluation;
+  });
+  summary.draws = rows.size();
+  const std::vector<std::vector<double>> prior = shownColumns(dimensions, priorDraws);
+  for (std::size_t j = 0; j < dimensions.names.size(); ++j) {
+    std::vector<double> values;
+    values.reserve(rows.size());
+    for (const std::vector<double>& row : rows) values.push_back(row[j]);
+    const SampleSummary found = summariseSample(values);
+    summary.dimensions.push_back({found.mean,
+                                  found.standardDeviation,
+                                  {found.quantiles.begin(), found.quantiles.end()},
+                                  quantilesOf(prior[j]),
+                                  check->rHat[j],
+                                  check->effectiveSizes[j]});
+  }
+  summary.correlations = correlationMatrix(rows);
+  return summary;
+}
+
+DataTable chainsTable(const DreamSampler& sampler, const ShownDimensions& dimensions) {
+  DataTable table{run_files::kChains,
+                  {"The states of the chains. Rows with 1 in Burn_In are no part of the posterior; a rejected proposal "
+                   "repeats the state before it, and Evaluation is the model run of the state"},
+                  {"Generation", "Chain", "Burn_In", "Evaluation", "Accepted", "Log_Likelihood", "Log_Prior"},
+                  {}};
+  table.columns.insert(table.columns.end(), dimensions.names.begin(), dimensions.names.end());
+  const ChainHistory& history = sampler.history();
+  const std::size_t burnIn = sampler.burnIn().value_or(history.generations());
+  for (std::size_t g = 0; g < history.generations(); ++g) {
+    for (std::size_t c = 0; c < history.chainCount(); ++c) {
+      const ChainHistory::State state = history.at(g, c);
+      std::vector<DataTable::Cell>& row = table.rows.emplace_back();
+      row = {static_cast<std::int64_t>(g + 1),
+             static_cast<std::int64_t>(c + 1),
+             static_cast<std::int64_t>(g < burnIn ? 1 : 0),
+             static_cast<std::int64_t>(state.evaluation),
+             static_cast<std::int64_t>(state.accepted ? 1 : 0),
+             state.logLikelihood,
+             state.logPrior};
+      for (const double value : dimensions.shown(state.point)) row.emplace_back(value);
+    }
+  }
+  return table;
+}
+
+DataTable posteriorTable(const PosteriorSummary& summary, const ShownDimensions& dimensions) {
+  DataTable table{run_files::kPosterior,
+                  {fmt::format("The posterior by {} states of the chains, and quantiles of the prior", summary.draws),
+                   fmt::format("Most probable: evaluation {}", summary.mostProbableRun)},
+                  {"Name", "Kind", "Mean", "Standard deviation"},
+                  {}};
+  for (const double p : kSummaryProbabilities) table.columns.push_back(fmt::format("{:g} %", 100.0 * p));
+  table.columns.insert(table.columns.end(), {"Most probable", "R-hat", "Effective size"});
+  for (const double p : kSummaryProbabilities) table.columns.push_back(fmt::format("Prior {:g} %", 100.0 * p));
+  for (std::size_t j = 0; j < dimensions.names.size(); ++j) {
+    const PosteriorSummary::Dimension& own = summary.dimensions[j];
+    const std::string kind = j < dimensions.modelParameterCount ? "parameter" : "error";
+    std::vector<DataTable::Cell> row{dimensions.names[j], kind, own.mean, own.standardDeviation};
+    row.insert(row.end(), own.quantiles.begin(), own.quantiles.end());
+    for (const double value : {summary.mostProbable[j], own.rHat, own.effectiveSize}) row.emplace_back(value);
+    row.insert(row.end(), own.priorQuantiles.begin(), own.priorQuantiles.end());
+    table.rows.push_back(std::move(row));
+  }
+  return table;
+}
+
+DataTable marginalsTable(const DreamSampler& sampler, const ShownDimensions& dimensions,
+                         std::span<const std::vector<double>> priorDraws) {
+  DataTable table{run_files::kMarginals,
+                  {"Shares of the posterior and of the prior in bins of equal width over the range of the posterior"},
+                  {"Name", "From", "To", "Posterior", "Prior"},
+                  {}};
+  std::vector<std::vector<double>> columns(dimensions.names.size());
+  forPosterior(sampler, [&](const ChainHistory::State& state) {
+    const std::vector<double> values = dimensions.shown(state.point);
+    for (std::size_t j = 0; j < columns.size(); ++j) columns[j].push_back(values[j]);
+  });
+  const std::vector<std::vector<double>> prior = shownColumns(dimensions, priorDraws);
+  for (std::size_t j = 0; j < columns.size(); ++j) {
+    if (columns[j].empty()) continue;
+    const auto [least, largest] = std::ranges::minmax(columns[j]);
+    if (!(largest > least)) continue;
+    const double width = (largest - least) / kBins;
+    const auto sharesOf = [&, from = least, to = largest](std::span<const double> values) {
+      std::vector<double> shares(kBins, 0.0);
+      for (const double value : values) {
+        if (value < from || value > to) continue;
+        const auto bin = std::min(static_cast<std::size_t>((value - from) / width), kBins - 1);
+        shares[bin] += 1.0 / static_cast<double>(values.size());
+      }
+      return shares;
+    };
+    const std::vector<double> after = sharesOf(columns[j]);
+    const std::vector<double> before = sharesOf(prior[j]);
+    for (std::size_t b = 0; b < kBins; ++b) {
+      const double from = least + static_cast<double>(b) * width;
+      table.rows.push_back({dimensions.names[j], from, from + width, after[b], before[b]});
+    }
+  }
+  return table;
+}
+
+DataTable convergenceTable(const DreamSampler& sampler, const ShownDimensions& dimensions) {
+  DataTable table{run_files::kConvergence,
+                  {"Split R-hat and effective sample sizes behind burn-in"},
+                  {"Generation", "Evaluations", "Name", "R-hat", "Effective size"},
+                  {}};
+  std::vector<ConvergenceCheck> checks = sampler.checks();
+  const auto last = sampler.checkNow();
+  if (last && (checks.empty() || checks.back().generations != last->generations)) checks.push_back(*last);
+  for (const ConvergenceCheck& check : checks) {
+    for (std::size_t j = 0; j < dimensions.names.size(); ++j) {
+      table.rows.push_back({static_cast<std::int64_t>(check.generations), static_cast<std::int64_t>(check.runs),
+                            dimensions.names[j], check.rHat[j], check.effectiveSizes[j]});
+    }
+  }
+  return table;
+}
+
+std::vector<std::string> formatPosterior(const DreamSettings& settings, const DreamSampler& sampler,
+                                         const ShownDimensions& dimensions, const PosteriorSummary* summary,
+                                         int failures, std::string_view correlationFile) {
+  const ChainHistory& history = sampler.history();
+  std::vector<std::string> lines{fmt::format("DREAM(ZS): {} chains, {} generations, {}", history.chainCount(),
+                                             history.generations(),
+                                             countText(static_cast<std::size_t>(sampler.runs()), "model run"))};
+  lines.push_back(endText(settings, sampler.end()));
+  if (failures > 0) {
+    lines.push_back(fmt::format("{} failed or without a likelihood: their sets have likelihood 0 and were rejected",
+                                countText(static_cast<std::size_t>(failures), "model run")));
+  }
+  if (summary == nullptr) {
+    lines.emplace_back(sampler.burnIn() ? "Warning: No posterior: there are fewer than 4 generations behind burn-in"
+                                        : "Warning: No posterior: the run ended in burn-in");
+    return lines;
+  }
+  lines.push_back(
+      fmt::format("Burn-in: the first {} generations ({:g} of Sample_Size), which are left out; the "
+                  "posterior is {} states behind it",
+                  *sampler.burnIn(), settings.burnInShare, summary->draws));
+  appendConvergence(settings, dimensions, *summary, lines);
+  appendCounts(sampler, lines);
+  appendQuantiles(dimensions, *summary, lines);
+  appendTradeOffs(dimensions, *summary, correlationFile, lines);
+  return lines;
+}
+
+}  // namespace mirevo

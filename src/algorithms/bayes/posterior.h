@@ -1,0 +1,58 @@
+#pragma once
+
+#include <cstddef>
+#include <functional>
+#include <span>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "algorithms/bayes/dream_sampler.h"
+#include "common/data_table.h"
+
+namespace mirevo {
+
+/// The sampled dimensions as people and tables know them.
+struct ShownDimensions {
+  std::vector<std::string> names;
+  std::size_t modelParameterCount = 0;  ///< the others are parameters of error models
+  /// A point of the chains on the scale on which its values mean something: the model's, for model parameters.
+  std::function<std::vector<double>(std::span<const double>)> shown;
+};
+
+/// What the chains say behind burn-in, each vector with one entry per dimension.
+struct PosteriorSummary {
+  struct Dimension {
+    double mean = 0.0;
+    double standardDeviation = 0.0;
+    std::vector<double> quantiles;       ///< at kSummaryProbabilities
+    std::vector<double> priorQuantiles;  ///< likewise, of draws from the prior
+    double rHat = 0.0;
+    double effectiveSize = 0.0;
+  };
+  std::vector<Dimension> dimensions;
+  std::vector<std::vector<double>> correlations;
+  std::vector<double> mostProbable;  ///< the state of the largest posterior density
+  int mostProbableRun = 0;
+  std::size_t draws = 0;  ///< states behind burn-in
+};
+
+/// `priorDraws`: points of the chains' scale. Empty while there are fewer than 4 generations behind burn-in.
+std::optional<PosteriorSummary> summarisePosterior(const DreamSampler& sampler, const ShownDimensions& dimensions,
+                                                   std::span<const std::vector<double>> priorDraws);
+
+/// Every state of every chain; rows with 1 in the column Burn_In are no part of the posterior.
+DataTable chainsTable(const DreamSampler& sampler, const ShownDimensions& dimensions);
+DataTable posteriorTable(const PosteriorSummary& summary, const ShownDimensions& dimensions);
+/// Posterior and prior as histograms with bins of equal width, for drawing.
+DataTable marginalsTable(const DreamSampler& sampler, const ShownDimensions& dimensions,
+                         std::span<const std::vector<double>> priorDraws);
+/// R-hat and effective sample sizes each time that they were looked at.
+DataTable convergenceTable(const DreamSampler& sampler, const ShownDimensions& dimensions);
+
+/// The same in words, for the log. `failures`: proposals whose model run failed.
+std::vector<std::string> formatPosterior(const DreamSettings& settings, const DreamSampler& sampler,
+                                         const ShownDimensions& dimensions, const PosteriorSummary* summary,
+                                         int failures, std::string_view correlationFile);
+
+}  // namespace mirevo

@@ -1,0 +1,217 @@
+#include "run/tasks/dream_section.h"
+
+#include <string>
+#include <utility>
+
+#include <fmt/format.h>
+
+#include "common/text.h"
+
+namespace mirevo {
+namespace {
+
+/// The value of the enumerator with this name, of a coded keyword whose codes are names in the order of the
+/// enumerators.
+template <class Enum, std::size_t Count>
+Enum named(const CodeName (&names)[Count], const SetupValue& value) {
+  std::size_t found = 0;
+  for (std::size_t k = 0; k < Count; ++k) {
+    if (isCode(names[k], value)) found = k;
+  }
+  return static_cast<Enum>(found);
+}
+
+constexpr const char* kTermMeanings[] = {
+    "Standard deviation of the errors; in the unit of the transformed series with `Box_Cox_Lambda`; with "
+    "`Error_Share` its part that is the same for all values; with `Likelihood = 'Student'` the scale. By default "
+    "between 0.001 and 10 times the standard deviation of the observations. The prior is uniform for its logarithm.",
+    "Part of the standard deviation that grows with the simulated value.",
+    "Correlation of the errors of one observation and the next.",
+    "Lambda of the Box-Cox transformation of simulated and observed values; 1: none, 0: logarithm.",
+    "Degrees of freedom of Student's t distribution. The prior is uniform for the logarithm.",
+    "Skewness xi of the generalised likelihood; 1: symmetric. The prior is uniform for the logarithm.",
+    "Kurtosis beta of the generalised likelihood; -1: uniform, 0: normal, 1: double exponential.",
+    "Bias mu_h of the generalised likelihood: a simulated value f counts as f exp(mu_h f).",
+};
+
+template <class Settings, std::size_t Term>
+KeywordRow termRow(ErrorModelSettings& (*modelOf)(Settings&)) {
+  static_cast<void>(modelOf);
+  return setting<Settings>(
+      [](Settings& settings) -> std::vector<double>& {
+        if constexpr (std::is_same_v<Settings, DreamSection>) {
+          return settings.errors.terms[Term];
+        } else {
+          return settings.terms[Term];
+        }
+      },
+      {.name = errorTermRows()[Term].keyword,
+       .defaultValue = kNoDefault,
+       .meaning = std::string(kTermMeanings[Term]) +
+                  (std::is_same_v<Settings, DreamSection> ? " One number: it is fixed; two: it is estimated between "
+                                                            "them."
+                                                          : "")});
+}
+
+template <class Settings, std::size_t... Terms>
+void appendTerms(std::vector<KeywordRow>& rows, std::index_sequence<Terms...> /*terms*/) {
+  (rows.push_back(termRow<Settings, Terms>(nullptr)), ...);
+}
+
+std::vector<KeywordRow> dreamRows() {
+  std::vector<KeywordRow> rows{
+      choice<DreamSection>(
+          [](DreamSection& s, const SetupValue& value) {
+            s.errors.form = named<LikelihoodForm>(kLikelihoodNames, value);
+          },
+          {.name = kLikelihoodKeyword,
+           .codes = kLikelihoodNames,
+           .meaning = "How the errors of the simulated series are distributed. 'objective': the log-likelihood is "
+                      "minus an objective function, for models that give their own."}),
+      setting<&DreamSection::objective>({.name = "Objective_Function",
+                                         .defaultValue = "0",
+                                         .range = from(0),
+                                         .meaning = "With `Likelihood = 'objective'`, the number of the objective "
+                                                    "function; 0: the aggregate of all."}),
+      setting<DreamSection>([](auto& s) -> auto& { return s.sampler.chainCount; },
+                            {.name = "Chain_Count",
+                             .defaultValue = "4",
+                             .range = between(3, 1000),
+                             .meaning = "Markov chains. Each generation runs the model once for each, all at a time."}),
+      setting<DreamSection>([](auto& s) -> auto& { return s.sampler.burnInShare; },
+                            {.name = "Burn_In_Share",
+                             .defaultValue = "0.2",
+                             .range = between(0.0, 0.9),
+                             .unit = "of `Sample_Size`",
+                             .meaning = "Model runs at the beginning that are no part of the posterior. Crossover "
+                                        "probabilities and outlier chains are dealt with in them alone."}),
+      setting<DreamSection>([](auto& s) -> auto& { return s.sampler.rHatLimit; },
+                            {.name = "R_Hat_Limit",
+                             .defaultValue = "1.05",
+                             .range = from(1.0),
+                             .meaning = "The run ends before its budget once R-hat of all parameters is at most this "
+                                        "..."}),
+      setting<DreamSection>([](auto& s) -> auto& { return s.sampler.effectiveSize; },
+                            {.name = "Effective_Size",
+                             .defaultValue = "400",
+                             .range = kPositive,
+                             .meaning = "... and the effective sample size of each at least this."}),
+      setting<DreamSection>([](auto& s) -> auto& { return s.sampler.pairCount; },
+                            {.name = "Max_Pairs",
+                             .defaultValue = "3",
+                             .range = between(1, 10),
+                             .meaning = "Most pairs of archive members whose differences make a jump."}),
+      setting<DreamSection>([](auto& s) -> auto& { return s.sampler.crossoverCount; },
+                            {.name = "Crossover_Values",
+                             .defaultValue = "3",
+                             .range = between(1, 100),
+                             .meaning = "Number n of crossover values 1/n, 2/n ... 1: the share of the parameters that "
+                                        "a jump changes."}),
+      setting<DreamSection>([](auto& s) -> auto& { return s.sampler.snookerShare; },
+                            {.name = "Snooker_Share",
+                             .defaultValue = "0.1",
+                             .range = between(0.0, 0.9),
+                             .meaning = "Share of snooker updates among the jumps."}),
+      setting<DreamSection>([](auto& s) -> auto& { return s.sampler.archiveInterval; },
+                            {.name = "Archive_Interval",
+                             .defaultValue = "10",
+                             .range = from(1),
+                             .unit = "generations",
+                             .meaning = "How often the states of the chains are added to the archive."}),
+      setting<DreamSection>([](auto& s) -> auto& { return s.sampler.archiveStart; },
+                            {.name = "Archive_Start",
+                             .defaultValue = "0",
+                             .range = between(0, 1'000'000),
+                             .meaning = "Draws from the prior in the archive at the beginning, which need no model "
+                                        "run; 0: ten for each parameter."}),
+      choice<DreamSection>(
+          [](DreamSection& s, const SetupValue& value) {
+            s.sampler.boundary = named<BoundaryHandling>(kBoundaryNames, value);
+          },
+          {.name = "Boundary_Handling",
+           .defaultValue = "'fold'",
+           .codes = kBoundaryNames,
+           .meaning = "What becomes of a jump that leaves the bounds: it comes in again on the opposite side, or is "
+                      "rejected. Both keep detailed balance."})};
+  appendTerms<DreamSection>(rows, std::make_index_sequence<kErrorTermCount>());
+  rows.push_back(setting<DreamSection>([](auto& s) -> auto& { return s.errors.shift; },
+                                       {.name = "Box_Cox_Shift",
+                                        .defaultValue = kNoDefault,
+                                        .unit = "of the series",
+                                        .meaning = "Added to simulated and observed values before the Box-Cox "
+                                                   "transformation, so that all are above 0. Default 0."}));
+  return rows;
+}
+
+std::vector<KeywordRow> errorModelRows() {
+  std::vector<KeywordRow> rows{choice<ErrorModelSettings>(
+      [](ErrorModelSettings& s, const SetupValue& value) { s.form = named<LikelihoodForm>(kLikelihoodNames, value); },
+      {.name = kLikelihoodKeyword, .defaultValue = kNoDefault, .codes = kLikelihoodNames, .meaning = "Its form."})};
+  appendTerms<ErrorModelSettings>(rows, std::make_index_sequence<kErrorTermCount>());
+  rows.push_back(setting<&ErrorModelSettings::shift>(
+      {.name = "Box_Cox_Shift", .defaultValue = kNoDefault, .unit = "of the series", .meaning = "As there."}));
+  return rows;
+}
+
+void checkTerms(const SetupSection& section, const ErrorModelSettings& settings) {
+  for (std::size_t k = 0; k < kErrorTermCount; ++k) {
+    const std::vector<double>& numbers = settings.terms[k];
+    const ErrorTermRow& row = errorTermRows()[k];
+    const auto refuse = [&](const std::string& explanation) {
+      section.refuse("Error: Error model of DREAM invalid", row.keyword, explanation);
+    };
+    if (numbers.empty()) continue;
+    if (numbers.size() > 2) {
+      refuse(fmt::format("expected one number (a fixed value) or two (bounds), found {}", numbers.size()));
+    }
+    for (const double number : numbers) {
+      const bool isPositive = k == kDeviation && numbers.size() == 1;
+      if (!(number >= row.least && number <= row.most) || (isPositive && number == 0.0)) {
+        refuse(fmt::format("expected {:g} to {:g}{}, found {:g}", row.least, row.most, isPositive ? ", but not 0" : "",
+                           number));
+      }
+    }
+    if (numbers.size() == 2 && !(numbers[0] < numbers[1])) {
+      refuse(fmt::format("expected a lower bound below the upper one, found {:g} and {:g}", numbers[0], numbers[1]));
+    }
+  }
+}
+
+}  // namespace
+
+const SettingSection<DreamSection>& dreamSection() {
+  static const SettingSection<DreamSection> section{{"UNCERTAINTY_ESTIMATION/DREAM",
+                                                     "when `Uncertainty_Type` is 'DREAM'",
+                                                     "The posterior distribution by Markov chains, DREAM(ZS). "
+                                                     "`Sample_Size` is the most model runs that it makes.",
+                                                     dreamRows()}};
+  return section;
+}
+
+const SettingSection<ErrorModelSettings>& errorModelSection() {
+  static const SettingSection<ErrorModelSettings> section{
+      {"UNCERTAINTY_ESTIMATION/DREAM/ERROR_MODEL_n", "if present",
+       "The error model of output measure n, where it differs from that of `DREAM`: the keywords mean what they mean "
+       "there.",
+       errorModelRows()}};
+  return section;
+}
+
+void readDreamSection(const SetupSection& section, DreamSection& settings) {
+  constexpr std::size_t kMostMeasures = 10'000;
+  const SetupSection dream = section.open("DREAM");
+  dream.read(dreamSection(), settings);
+  checkTerms(dream, settings.errors);
+  for (std::size_t n = 1; n <= kMostMeasures; ++n) {
+    if (!dream.has(fmt::format("{}{}", kErrorModelPrefix, n))) continue;
+    const SetupSection own = dream.openItem(kErrorModelPrefix, n);
+    own.read(errorModelSection(), settings.own[n]);
+    checkTerms(own, settings.own[n]);
+    if (settings.own[n].form == LikelihoodForm::objective || settings.errors.form == LikelihoodForm::objective) {
+      own.refuse("Error: Error model of DREAM invalid", kLikelihoodKeyword,
+                 "expected no error model of an output measure where the likelihood is an objective function");
+    }
+  }
+}
+
+}  // namespace mirevo

@@ -1,0 +1,43 @@
+#pragma once
+
+#include <array>
+#include <cstdint>
+#include <map>
+#include <optional>
+#include <string_view>
+#include <vector>
+
+#include "algorithms/bayes/dream_sampler.h"
+#include "algorithms/bayes/likelihoods.h"
+#include "common/settings/keyword_row.h"
+#include "run/access/setup_access.h"
+
+namespace mirevo {
+
+/// The error model of a series, as a setup gives it.
+struct ErrorModelSettings {
+  std::optional<LikelihoodForm> form;
+  /// Of each term its value if it is fixed, or its bounds; empty: the default.
+  std::array<std::vector<double>, kErrorTermCount> terms;
+  std::optional<double> shift;  ///< of the Box-Cox transformation
+};
+
+/// The section UNCERTAINTY_ESTIMATION/DREAM.
+struct DreamSection {
+  DreamSettings sampler;
+  ErrorModelSettings errors;  ///< of all series
+  std::map<std::size_t, ErrorModelSettings>
+      own;                     ///< of an output measure, by its number from 1; what it leaves open is as above
+  std::int32_t objective = 0;  ///< of Likelihood = 'objective': its number; 0: the aggregate
+};
+
+inline constexpr std::string_view kLikelihoodKeyword = "Likelihood";
+inline constexpr std::string_view kErrorModelPrefix = "ERROR_MODEL_";
+
+const SettingSection<DreamSection>& dreamSection();
+const SettingSection<ErrorModelSettings>& errorModelSection();
+
+/// Reads the section DREAM of `section` and those inside it. Throws FatalError.
+void readDreamSection(const SetupSection& section, DreamSection& settings);
+
+}  // namespace mirevo

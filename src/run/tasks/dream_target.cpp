@@ -1,0 +1,250 @@
+#include "run/tasks/dream_target.h"
+
+#include <algorithm>
+#include <cmath>
+#include <limits>
+#include <utility>
+
+#include <fmt/format.h>
+
+#include "common/fatal_error.h"
+#include "common/text.h"
+#include "measures/period_series.h"
+#include "measures/statistics.h"
+
+namespace mirevo {
+namespace {
+
+constexpr double kInfinity = std::numeric_limits<double>::infinity();
+constexpr const char* kRefusal = "Error: Likelihood of DREAM invalid";
+
+bool isInObjective(const TaskContext& context, std::size_t measure) {
+  return std::ranges::any_of(context.objectives, [measure](const ObjectiveFunction& objective) {
+    return std::ranges::any_of(objective.measures,
+                               [measure](const MeasureTerm& term) { return term.index == measure; });
+  });
+}
+
+/// The value of a term with one number, or its bounds; the default where the setup says nothing.
+std::vector<double> numbersOf(ErrorTerm term, const ErrorModelSettings& common, const ErrorModelSettings* own,
+                              LikelihoodForm form) {
+  if (own != nullptr && !own->terms[term].empty()) return own->terms[term];
+  if (!common.terms[term].empty()) return common.terms[term];
+  const ErrorTermRow& row = errorTermRows()[term];
+  if (!hasTerm(form, term)) return {row.neutral};
+  return {row.lower, row.upper};
+}
+
+}  // namespace
+
+DreamTarget::DreamTarget(const DreamSection& settings, const ParameterDistributions& prior, const TaskContext& context)
+    : prior_(prior), lower_(context.space.lower), upper_(context.space.upper) {
+  if (settings.errors.form == LikelihoodForm::objective) {
+    objective_ = static_cast<std::size_t>(settings.objective);
+    if (*objective_ > context.objectives.size()) {
+      fatalError(kRefusal,
+                 fmt::format("Objective_Function = {}: expected 0 to {}", *objective_, context.objectives.size()));
+    }
+  } else {
+    addSeries(settings, context);
+  }
+  for (const Dimension& dimension : errors_) {
+    lower_.push_back(dimension.lower);
+    upper_.push_back(dimension.upper);
+  }
+}
+
+/// Every pair of series that enters an objective function, once.
+void DreamTarget::addSeries(const DreamSection& settings, const TaskContext& context) {
+  std::size_t first = 0;
+  std::vector<std::size_t> taken;
+  for (std::size_t k = 0; k < context.observedSeries.size(); ++k) {
+    const ObservedSeries& observed = context.observedSeries[k];
+    const std::size_t begin = std::exchange(first, first + 2 * observed.values.size());  // values, then their units
+    const OutputMeasure& measure = context.measures[observed.measure];
+    const bool isRepeated =
+        std::ranges::any_of(taken, [&](std::size_t other) { return isSamePair(measure, context.measures[other]); });
+    if (!isInObjective(context, observed.measure) || isRepeated) continue;
+    taken.push_back(observed.measure);
+    const auto found = settings.own.find(observed.measure + 1);
+    const ErrorModelSettings* const own = found == settings.own.end() ? nullptr : &found->second;
+    const LikelihoodForm form = own != nullptr && own->form ? *own->form : *settings.errors.form;
+    const double shift = own != nullptr && own->shift ? *own->shift : settings.errors.shift.value_or(0.0);
+    series_.push_back(
+        {k, begin, SeriesErrors(form, shift, observed.days, observed.values, observed.weights), neutralErrors(), {}});
+    addTerms(settings.errors, own, form, measure.name, series_.back());
+  }
+  for (const auto& [number, own] : settings.own) {
+    if (std::ranges::find(taken, number - 1) != taken.end()) continue;
+    fatalError(kRefusal, fmt::format("{}{}: expected the number of an output measure that compares series and enters "
+                                     "an objective function (of several that compare the same, the first)",
+                                     kErrorModelPrefix, number));
+  }
+  if (!series_.empty()) return;
+  fatalError(kRefusal,
+             fmt::format("no objective function compares time series: expected {} = 'objective'", kLikelihoodKeyword));
+}
+
+void DreamTarget::addTerms(const ErrorModelSettings& common, const ErrorModelSettings* own, LikelihoodForm form,
+                           const std::string& measure, Series& series) {
+  const std::vector<double> lambda = numbersOf(kLambda, common, own, form);
+  if (lambda != std::vector<double>{1.0}) {
+    if (const auto value = series.errors.untransformable()) {
+      fatalError(kRefusal,
+                 fmt::format("the observation {:g} of {} has no Box-Cox transformation: expected a Box_Cox_Shift with "
+                             "which all observations are above 0",
+                             *value, quotedForMessage(measure)));
+    }
+  }
+  for (std::size_t k = 0; k < kErrorTermCount; ++k) {
+    const auto term = static_cast<ErrorTerm>(k);
+    const ErrorTermRow& row = errorTermRows()[k];
+    std::vector<double> numbers = numbersOf(term, common, own, form);
+    if (term == kDeviation && numbers.back() == 0.0) {
+      const double one = series.errors.deviation(lambda.front());
+      const double other = series.errors.deviation(lambda.back());
+      numbers = {1e-3 * std::min(one, other), 10.0 * std::max(one, other)};
+      if (!(numbers.front() > 0.0)) {
+        fatalError(kRefusal, fmt::format("the observations of {} do not vary: expected {} with a value or with bounds",
+                                         quotedForMessage(measure), row.keyword));
+      }
+    }
+    if (numbers.size() == 1) {
+      series.fixed[k] = numbers.front();
+      continue;
+    }
+    const bool isLogarithmic = row.isLogarithmic && numbers.front() > 0.0;
+    series.dimensions[k] = prior_.size() + errors_.size();
+    errors_.push_back({fmt::format("{} of {}", row.symbol, measure),
+                       isLogarithmic ? std::log(numbers.front()) : numbers.front(),
+                       isLogarithmic ? std::log(numbers.back()) : numbers.back(), isLogarithmic});
+  }
+}
+
+std::vector<double> DreamTarget::pointAt(std::span<const double> unit) const {
+  std::vector<double> point = prior_.setAt(unit.first(prior_.size()));
+  for (std::size_t j = point.size(); j < lower_.size(); ++j) {
+    point.push_back(lower_[j] + unit[j] * (upper_[j] - lower_[j]));
+  }
+  return point;
+}
+
+double DreamTarget::logPrior(const Feasibility& feasibility, std::span<const double> point) const {
+  const std::span<const double> set = point.first(prior_.size());
+  double sum = prior_.logDensity(set);
+  if (!(sum > -kInfinity) || !feasibility.holds(set)) return -kInfinity;
+  for (const Dimension& dimension : errors_) sum -= std::log(dimension.upper - dimension.lower);
+  return sum;
+}
+
+ErrorValues DreamTarget::errorsOf(const Series& series, std::span<const double> point) const {
+  ErrorValues values = series.fixed;
+  for (std::size_t k = 0; k < kErrorTermCount; ++k) {
+    const auto place = series.dimensions[k];
+    if (!place) continue;
+    values[k] = errors_[*place - prior_.size()].isLogarithmic ? std::exp(point[*place]) : point[*place];
+  }
+  return values;
+}
+
+double DreamTarget::objectiveOf(const TaskContext& context, const EvaluationResult& result) const {
+  const std::vector<double> values = result.exactMeasures.empty()
+                                         ? result.objectiveValues
+                                         : objectiveFunctionValues(context.objectives, result.exactMeasures);
+  if (*objective_ > 0) return values[*objective_ - 1];
+  return context.aggregate ? context.aggregate(values) : result.aggregate;
+}
+
+/// Of a run that succeeded.
+double DreamTarget::logLikelihood(const TaskContext& context, int number, std::span<const double> point) {
+  double sum = 0.0;
+  for (Series& series : series_) {
+    const std::size_t count = context.observedSeries[series.observed].values.size();
+    const std::vector<double> simulated = context.simulatedColumns(std::span(&number, 1), series.first, count);
+    if (!hasCounted_) series.errors.countWhere(simulated);
+    sum += series.errors.logLikelihood(simulated, errorsOf(series, point));
+  }
+  hasCounted_ = true;
+  return std::isnan(sum) ? -kInfinity : sum;
+}
+
+std::vector<ProposalResult> DreamTarget::evaluate(const TaskContext& context,
+                                                  std::span<const DreamProposal> proposals) {
+  std::vector<ParameterSet> sets;
+  for (const DreamProposal& proposal : proposals) {
+    if (proposal.knownRun == 0) sets.emplace_back(proposal.point.begin(), proposal.point.begin() + prior_.size());
+  }
+  std::vector<EvaluationResult> results;
+  if (!sets.empty()) results = context.evaluator.evaluateParameterSets(sets, DispatchMode::task);
+  std::vector<ProposalResult> found;
+  std::size_t next = 0;
+  for (const DreamProposal& proposal : proposals) {
+    const bool isNew = proposal.knownRun == 0;
+    const EvaluationResult* const result = isNew ? &results[next++] : nullptr;
+    const int number = isNew ? result->number : proposal.knownRun;
+    if (isNew && !result->ok()) {
+      known_[number] = -kInfinity;
+    } else if (isNew && objective_) {
+      const double value = -objectiveOf(context, *result);
+      known_[number] = std::isnan(value) ? -kInfinity : value;
+    }
+    const auto known = known_.find(number);
+    found.push_back({known != known_.end() ? known->second : logLikelihood(context, number, proposal.point), number});
+    if (isNew && found.back().logLikelihood == -kInfinity) ++failures_;
+  }
+  return found;
+}
+
+DreamProblem DreamTarget::problem(const TaskContext& context) {
+  DreamProblem problem;
+  problem.lower = lower_;
+  problem.upper = upper_;
+  problem.modelParameterCount = prior_.size();
+  problem.drawPrior = [this](std::span<const double> unit) { return pointAt(unit); };
+  problem.logPrior = [this, &context](std::span<const double> point) { return logPrior(context.feasibility, point); };
+  problem.evaluate = [this, &context](std::span<const DreamProposal> proposals) {
+    return evaluate(context, proposals);
+  };
+  return problem;
+}
+
+ShownDimensions DreamTarget::shown(const SearchSpace& space) const {
+  ShownDimensions dimensions{space.names, space.size(), {}};
+  for (const Dimension& dimension : errors_) dimensions.names.push_back(dimension.name);
+  dimensions.shown = [this, &space](std::span<const double> point) {
+    std::vector<double> values = ToModelScale(space, point.first(space.size()));
+    for (std::size_t k = 0; k < errors_.size(); ++k) {
+      const double value = point[space.size() + k];
+      values.push_back(errors_[k].isLogarithmic ? std::exp(value) : value);
+    }
+    return values;
+  };
+  return dimensions;
+}
+
+std::vector<std::vector<double>> DreamTarget::priorDraws(std::size_t count) const {
+  ChainRandom random(1);
+  std::vector<std::vector<double>> draws;
+  std::vector<double> unit(lower_.size());
+  for (std::size_t i = 0; i < count; ++i) {
+    for (double& value : unit) value = random.uniform();
+    draws.push_back(pointAt(unit));
+  }
+  return draws;
+}
+
+std::vector<std::string> DreamTarget::descriptionLines() const {
+  std::vector<std::string> lines;
+  for (const Series& series : series_) {
+    lines.push_back(fmt::format("Likelihood of {} observations", series.errors.count()));
+  }
+  for (const Dimension& dimension : errors_) {
+    const double lower = dimension.isLogarithmic ? std::exp(dimension.lower) : dimension.lower;
+    const double upper = dimension.isLogarithmic ? std::exp(dimension.upper) : dimension.upper;
+    lines.push_back(fmt::format("   {}: estimated between {:.6g} and {:.6g}{}", dimension.name, lower, upper,
+                                dimension.isLogarithmic ? ", log-uniform prior" : ""));
+  }
+  return lines;
+}
+
+}  // namespace mirevo

@@ -1,0 +1,74 @@
+#pragma once
+
+#include <array>
+#include <optional>
+#include <span>
+#include <string>
+#include <unordered_map>
+#include <vector>
+
+#include "algorithms/bayes/dream_sampler.h"
+#include "algorithms/bayes/likelihoods.h"
+#include "algorithms/bayes/posterior.h"
+#include "algorithms/distributions/parameter_distributions.h"
+#include "run/tasks/dream_section.h"
+#include "run/tasks/task.h"
+
+namespace mirevo {
+
+/// The posterior that DREAM samples: parameters of the model, then those of the errors of each series.
+class DreamTarget final {
+ public:
+  /// A series whose errors the likelihood is of.
+  struct Series {
+    std::size_t observed = 0;  ///< index in TaskContext::observedSeries
+    std::size_t first = 0;     ///< of its values among the simulated ones of a run
+    SeriesErrors errors;
+    ErrorValues fixed;
+    std::array<std::optional<std::size_t>, kErrorTermCount> dimensions;  ///< of the terms that are estimated
+  };
+
+  /// Throws FatalError where the setup's error models do not fit the observations.
+  DreamTarget(const DreamSection& settings, const ParameterDistributions& prior, const TaskContext& context);
+
+  /// For the sampler; `context` and this must outlive it.
+  DreamProblem problem(const TaskContext& context);
+
+  ShownDimensions shown(const SearchSpace& space) const;
+  std::vector<std::vector<double>> priorDraws(std::size_t count) const;
+  const std::vector<Series>& series() const { return series_; }
+  ErrorValues errorsOf(const Series& series, std::span<const double> point) const;
+  /// Model runs without a likelihood.
+  int failures() const { return failures_; }
+  std::vector<std::string> descriptionLines() const;
+
+ private:
+  struct Dimension {
+    std::string name;
+    double lower = 0.0;
+    double upper = 0.0;
+    bool isLogarithmic = false;  ///< sampled as its logarithm
+  };
+
+  void addSeries(const DreamSection& settings, const TaskContext& context);
+  void addTerms(const ErrorModelSettings& common, const ErrorModelSettings* own, LikelihoodForm form,
+                const std::string& measure, Series& series);
+  std::vector<double> pointAt(std::span<const double> unit) const;
+  double logPrior(const Feasibility& feasibility, std::span<const double> point) const;
+  std::vector<ProposalResult> evaluate(const TaskContext& context, std::span<const DreamProposal> proposals);
+  double logLikelihood(const TaskContext& context, int number, std::span<const double> point);
+  double objectiveOf(const TaskContext& context, const EvaluationResult& result) const;
+
+  ParameterDistributions prior_;
+  std::vector<double> lower_;
+  std::vector<double> upper_;
+  std::vector<Dimension> errors_;
+  std::vector<Series> series_;
+  std::optional<std::size_t> objective_;  ///< its number from 1, 0: the aggregate
+  bool hasCounted_ = false;               ///< whether a successful run has told which observations count
+  /// The log-likelihood of each run if it is an objective function, and -infinity of each that failed.
+  std::unordered_map<int, double> known_;
+  int failures_ = 0;
+};
+
+}  // namespace mirevo

@@ -1,0 +1,48 @@
+#pragma once
+
+#include <memory>
+
+#include "algorithms/analyses/uncertainty.h"
+#include "algorithms/bayes/dream_sampler.h"
+#include "algorithms/distributions/parameter_distributions.h"
+#include "run/tasks/dream_section.h"
+#include "run/tasks/dream_target.h"
+#include "run/tasks/task.h"
+
+namespace mirevo {
+
+/// Bayesian uncertainty analysis: the posterior distribution of the parameters by Markov chains, with bands.
+class DreamTask final : public Task {
+ public:
+  const TaskFacts& facts() const override;
+  std::vector<const SectionRow*> sections() const override;
+  std::vector<std::string> neededSections(const SetupSection& target) const override;
+  void read(const TaskReading& reading) override;
+  std::string description() const override;
+  std::vector<std::string> summaryLines(const SearchSpace& space) const override;
+  int plannedEvaluations() const override { return settings.sampleSize; }
+  int mostAtOnce() const override { return dream.sampler.chainCount; }
+  bool drawsRandomNumbers() const override { return true; }
+  bool keepsSimulatedValues() const override { return true; }
+  bool readsSimulatedValues() const override { return true; }
+  SeriesPrecision keptPrecision() const override { return SeriesPrecision::exact; }
+  std::optional<KeptSteps> keptSteps() const override;
+  bool usesExactMeasures() const override { return true; }
+  TaskOutcome run(const TaskContext& context) override;
+  /// Of the generations that are complete.
+  std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const override;
+  std::optional<int> evaluationsInBatches() const override { return sampler_ ? sampler_->runs() : 0; }
+  TaskReport report() const override { return {.hasBands = true}; }
+
+  UncertaintySettings settings;  ///< what all forms of the task have in common
+  DreamSection dream;
+
+ private:
+  TaskOutcome outcomeOf(const TaskContext& context) const;
+
+  ParameterDistributions prior_;
+  std::unique_ptr<DreamTarget> target_;  ///< of the run
+  std::unique_ptr<DreamSampler> sampler_;
+};
+
+}  // namespace mirevo

@@ -1,0 +1,143 @@
+#include "run/tasks/posterior_bands.h"
+
+#include <algorithm>
+#include <cmath>
+#include <limits>
+
+#include <fmt/format.h>
+
+#include "algorithms/analyses/series_band.h"
+#include "common/run_files.h"
+
+namespace mirevo {
+namespace {
+
+constexpr std::size_t kMostStates = 2000;
+
+/// A state of the posterior that the bands are of.
+struct BandState {
+  std::span<const double> point;
+  std::size_t run = 0;  ///< index of its model run among the different ones
+};
+
+struct BandStates {
+  std::vector<BandState> states;
+  std::vector<int> runs;  ///< numbers of the different model runs, ascending
+};
+
+/// States of all chains at equal distances behind burn-in.
+BandStates bandStates(const DreamSampler& sampler) {
+  const ChainHistory& history = sampler.history();
+  const std::size_t first = sampler.burnIn().value_or(history.generations());
+  const std::size_t count = (history.generations() - first) * history.chainCount();
+  const std::size_t stride = std::max<std::size_t>((count + kMostStates - 1) / kMostStates, 1);
+  BandStates found;
+  std::vector<int> numbers;
+  for (std::size_t k = 0; k < count; k += stride) {
+    const auto state = history.at(first + k / history.chainCount(), k % history.chainCount());
+    if (!(state.logLikelihood > -std::numeric_limits<double>::infinity())) continue;
+    found.states.push_back({state.point, 0});
+    numbers.push_back(state.evaluation);
+  }
+  found.runs = numbers;
+  std::ranges::sort(found.runs);
+  found.runs.erase(std::unique(found.runs.begin(), found.runs.end()), found.runs.end());
+  for (std::size_t i = 0; i < numbers.size(); ++i) {
+    const auto place = std::ranges::lower_bound(found.runs, numbers[i]);
+    found.states[i].run = static_cast<std::size_t>(place - found.runs.begin());
+  }
+  return found;
+}
+
+/// "   mean width 3.2, 21 % of the range of the observations"
+std::string widthText(const SeriesBand& band, const ObservedSeries& observed) {
+  double sum = 0.0;
+  double least = std::numeric_limits<double>::infinity();
+  double largest = -least;
+  for (std::size_t t = 0; t < observed.values.size(); ++t) {
+    if (std::isnan(observed.values[t]) || band.runs[t] == 0) continue;
+    sum += band.upper[t] - band.lower[t];
+    least = std::min(least, observed.values[t]);
+    largest = std::max(largest, observed.values[t]);
+  }
+  const double width = sum / static_cast<double>(band.observationCount);
+  return fmt::format("mean width {:.4g}, {:.1f} % of the range of the observations", width,
+                     100.0 * width / (largest - least));
+}
+
+class BandReport {
+ public:
+  BandReport(const TaskContext& context, bool hasSteps, std::vector<TaskFile>& files)
+      : context_(context), hasSteps_(hasSteps), files_(files) {}
+
+  void add(const ObservedSeries& observed, const RunFile& file, const std::string& what, const SeriesBand& band) {
+    const std::string& name = context_.measures[observed.measure].name;
+    files_.push_back({runFilePath(context_.filePrefix, file, static_cast<int>(observed.measure) + 1),
+                      seriesBandText(name, observed, band, hasSteps_)});
+    if (band.observationCount == 0) {
+      lines.push_back(fmt::format("{} of {}: no observation has a simulated value", what, name));
+    } else {
+      lines.push_back(fmt::format("{} of {}: {:.1f} % of {} observations lie between the 5 and the 95 % quantile, {}",
+                                  what, name, 100.0 * band.shareInside, band.observationCount,
+                                  widthText(band, observed)));
+    }
+    lines.push_back("   " + files_.back().path);
+  }
+
+  std::vector<std::string> lines;
+
+ private:
+  const TaskContext& context_;
+  bool hasSteps_;
+  std::vector<TaskFile>& files_;
+};
+
+}  // namespace
+
+std::vector<std::string> reportPosteriorBands(const TaskContext& context, const DreamTarget& target,
+                                              const DreamSampler& sampler, bool hasSteps, std::int32_t seed,
+                                              std::vector<TaskFile>& files) {
+  const BandStates found = bandStates(sampler);
+  BandReport report(context, hasSteps, files);
+  if (found.states.empty()) return {};
+  const std::size_t stateCount = found.states.size();
+  std::size_t first = 0;
+  for (std::size_t k = 0; k < context.observedSeries.size(); ++k) {
+    const ObservedSeries& observed = context.observedSeries[k];
+    /// The values of all states at some times, those of a time side by side.
+    const auto simulated = [&](std::size_t index, std::size_t count) {
+      const std::vector<double> ofRuns = context.simulatedColumns(found.runs, first + index, count);
+      std::vector<double> values;
+      values.reserve(count * stateCount);
+      for (std::size_t t = 0; t < count; ++t) {
+        for (const BandState& state : found.states) values.push_back(ofRuns[t * found.runs.size() + state.run]);
+      }
+      return values;
+    };
+    report.add(observed, run_files::kBand, "Band of parameter uncertainty",
+               seriesBand(observed.values, stateCount, simulated));
+    const auto series = std::ranges::find(target.series(), k, &DreamTarget::Series::observed);
+    if (series != target.series().end()) {
+      std::vector<SeriesErrors::Path> paths;
+      for (const BandState& state : found.states) {
+        paths.emplace_back(series->errors, target.errorsOf(*series, state.point));
+      }
+      ChainRandom random(seed, k + 1);
+      const auto observable = [&](std::size_t index, std::size_t count) {
+        std::vector<double> values = simulated(index, count);
+        for (std::size_t i = 0; i < values.size(); ++i) {
+          values[i] = paths[i % stateCount].next(index + i / stateCount, values[i], random);
+        }
+        return values;
+      };
+      report.add(observed, run_files::kTotalBand, "Band of total uncertainty",
+                 seriesBand(observed.values, stateCount, observable));
+    }
+    first += 2 * observed.values.size();
+  }
+  report.lines.push_back(fmt::format("The bands are of {} states of the posterior and their {} model runs", stateCount,
+                                     found.runs.size()));
+  return std::move(report.lines);
+}
+
+}  // namespace mirevo

@@ -1,0 +1,69 @@
+#pragma once
+
+#include <cmath>
+#include <functional>
+#include <limits>
+#include <span>
+#include <utility>
+#include <vector>
+
+#include "algorithms/bayes/dream_sampler.h"
+
+namespace mirevo {
+
+/// A posterior that is a function, between bounds, under a uniform prior.
+inline DreamProblem sampledFunction(std::vector<double> lower, std::vector<double> upper,
+                                    std::function<double(std::span<const double>)> logLikelihood) {
+  DreamProblem problem;
+  problem.modelParameterCount = lower.size();
+  problem.drawPrior = [lower, upper](std::span<const double> unit) {
+    std::vector<double> point;
+    for (std::size_t j = 0; j < unit.size(); ++j) point.push_back(lower[j] + unit[j] * (upper[j] - lower[j]));
+    return point;
+  };
+  problem.logPrior = [](std::span<const double>) { return 0.0; };
+  problem.evaluate = [logLikelihood = std::move(logLikelihood), number = 0](auto proposals) mutable {
+    std::vector<ProposalResult> results;
+    for (const DreamProposal& proposal : proposals) {
+      const bool isKnown = proposal.knownRun != 0;
+      results.push_back({logLikelihood(proposal.point), isKnown ? proposal.knownRun : ++number});
+    }
+    return results;
+  };
+  problem.lower = std::move(lower);
+  problem.upper = std::move(upper);
+  return problem;
+}
+
+/// The chains at the end of their run.
+inline DreamSampler sampled(const DreamSettings& settings, DreamProblem problem, int seed = 1) {
+  DreamSampler sampler(settings, std::move(problem), seed);
+  while (!sampler.isFinished()) sampler.advance();
+  return sampler;
+}
+
+/// The values of a dimension behind burn-in.
+inline std::vector<double> posteriorOf(const DreamSampler& sampler, std::size_t dimension) {
+  std::vector<double> values;
+  for (const auto& chain : sampler.history().columns(dimension, sampler.burnIn().value_or(0))) {
+    values.insert(values.end(), chain.begin(), chain.end());
+  }
+  return values;
+}
+
+struct Moments {
+  double mean = 0.0;
+  double deviation = 0.0;
+};
+
+inline Moments momentsOf(std::span<const double> values) {
+  Moments moments;
+  for (const double value : values) moments.mean += value / static_cast<double>(values.size());
+  for (const double value : values) {
+    moments.deviation += (value - moments.mean) * (value - moments.mean) / static_cast<double>(values.size());
+  }
+  moments.deviation = std::sqrt(moments.deviation);
+  return moments;
+}
+
+}  // namespace mirevo

@@ -1,0 +1,175 @@
+#include <cmath>
+#include <sstream>
+
+#include <gmock/gmock.h>
+
+#include "common/data_table.h"
+#include "integration/model_folder.h"
+
+namespace mirevo::testing {
+namespace {
+
+using ::testing::HasSubstr;
+using ::testing::Not;
+
+/// A setup with chains for a, b (c is fixed). `dream`: further lines of the section DREAM.
+std::string writeDream(const ModelFolder& folder, RunSettings settings, const std::string& dream) {
+  settings.option = 3;
+  folder.writeSetup(settings);
+  std::string text = folder.read("basin.kdx");
+  const auto begin = text.find("Uncertainty_Type = 1");
+  text.replace(begin, 20, "Uncertainty_Type = 'DREAM'");
+  const auto first = text.find("[PARAMETER_1]", begin);
+  const auto last = text.find("[/UNCERTAINTY_ESTIMATION]", first);
+  text.replace(first, last - first, "[DREAM]\n" + dream + "\n    [/DREAM]\n  ");
+  return folder.write("basin.kdx", text);
+}
+
+double cell(const std::string& table, const std::string& name, const std::string& column) {
+  const ReadTable read = readDataTable(table);
+  for (const auto& row : read.rows) {
+    if (row[0] == name) return realCell(row[*read.column(column)]).value();
+  }
+  ADD_FAILURE() << "no row " << name << " in\n" << table;
+  return std::nan("");
+}
+
+/// The standard deviations of a and b of a + b sin(t / 58), t = 0 ... 364, for errors of standard deviation 1.
+struct Expected {
+  double a = 0.0;
+  double b = 0.0;
+  double correlation = 0.0;
+};
+
+Expected linearModel() {
+  double one = 0.0;
+  double sum = 0.0;
+  double squares = 0.0;
+  for (int t = 0; t < 365; ++t) {
+    const double s = std::sin(t / 58.0);
+    one += 1.0;
+    sum += s;
+    squares += s * s;
+  }
+  const double determinant = one * squares - sum * sum;
+  return {std::sqrt(squares / determinant), std::sqrt(one / determinant), -sum / std::sqrt(one * squares)};
+}
+
+TEST(Dream, ThePosteriorOfALinearModelIsTheOneInClosedForm) {
+  const ModelFolder folder;
+  const std::string dream = "Likelihood = 'normal'\n Error_Deviation = 3.0\n Effective_Size = 60\n R_Hat_Limit = 1.2";
+  const ProgramResult result = runProgram({writeDream(folder, {.maxEvaluations = 1500}, dream)});
+  ASSERT_EQ(result.exitCode, 0) << result.error;
+  const std::string chains = folder.read("basin_Chains.dat");
+  const std::string posterior = folder.read("basin_Posterior.dat");
+  const Expected expected = linearModel();
+  for (const auto& [name, mean, deviation] :
+       {std::tuple{"a", 5.0, 3.0 * expected.a}, std::tuple{"b", 2.0, 3.0 * expected.b}}) {
+    const double error = 4.0 * deviation / std::sqrt(cell(posterior, name, "Effective size"));
+    EXPECT_NEAR(cell(posterior, name, "Mean"), mean, error);
+    EXPECT_NEAR(cell(posterior, name, "Standard deviation"), deviation, error);
+  }
+  EXPECT_NEAR(cell(folder.read("basin_SampleCorrelation.dat"), "a", "b"), expected.correlation, 0.4);
+  // The rows of the chains: natural logarithm of the normal density of 365 errors, at the states' own evaluations.
+  const ReadTable table = readDataTable(chains);
+  const ReadTable results = readDataTable(folder.read("basin.dat"));
+  const auto& row = table.rows.back();
+  const auto number = static_cast<std::size_t>(realCell(row[*table.column("Evaluation")]).value());
+  const double rmse = realCell(results.rows[number - 1][*results.column("flow")]).value();
+  const double logLikelihood = -365.0 * (0.5 * rmse * rmse / 9.0 + std::log(3.0) + 0.5 * std::log(2.0 * M_PI));
+  EXPECT_NEAR(realCell(row[*table.column("Log_Likelihood")]).value(), logLikelihood, 1e-3);
+  EXPECT_EQ(row[*table.column("a")], results.rows[number - 1][*results.column("a")]);
+
+  const std::string log = folder.read("basin.log");
+  for (const char* const text : {"The chains have converged", "Burn-in: the first ",
+                                 "Band of parameter uncertainty of flow: 100.0 % of 365 observations",
+                                 "Band of total uncertainty of flow: 100.0 % of 365 observations"}) {
+    EXPECT_NE(log.find(text), std::string::npos) << text;  // without the whole log
+  }
+  // The total band is 2 * 1.645 * 3 wide.
+  std::istringstream band(folder.read("basin_TotalBand_1.csv"));
+  double width = 0.0;
+  for (std::string line; std::getline(band, line);) {
+    double values[4];
+    if (std::sscanf(line.c_str(), "%*[^,],%lf,%lf,%lf,%lf", values, values + 1, values + 2, values + 3) == 4) {
+      width += (values[3] - values[1]) / 365.0;
+    }
+  }
+  EXPECT_NEAR(width, 2.0 * 1.645 * 3.0, 0.8);
+}
+
+TEST(Dream, AnInterruptedRunHasThePosteriorOfItsGenerationsAndGoesOnToTheSameBitsInOtherSlots) {
+  const ModelFolder folder;
+  const std::string dream = "Likelihood = 'AR(1)'\n Error_Deviation = 0.5, 5.0";
+  const RunSettings settings{.maxEvaluations = 200, .restart = 2};
+  ASSERT_EQ(runProgram({writeDream(folder, settings, dream)}).exitCode, 0);
+  const std::string posterior = folder.read("basin_Posterior.dat");
+  const std::string chains = folder.read("basin_Chains.dat");
+  const std::string bands = folder.read("basin_TotalBand_1.csv");
+
+  const ModelFolder other;
+  other.useScript("test -e '" + other / "sound" + "' || test ! -e '" + other / "stop" + "' || exit 3\n" +
+                  "echo . >> '" + other / "count" + "'; test $(wc -l < '" + other / "count" + "') -lt 152 || touch '" +
+                  other / "stop" + "'");
+  RunSettings twoSlots = settings;
+  twoSlots.slots = 2;
+  const std::string setup = writeDream(other, twoSlots, dream);
+  EXPECT_EQ(runProgram({setup}).exitCode, 1);
+  EXPECT_THAT(other.read("basin_Posterior.dat"), HasSubstr("Unfinished run"));
+  other.write("sound", "");
+  const ProgramResult goneOn = runProgram({setup});
+  EXPECT_EQ(goneOn.exitCode, 0) << goneOn.error;
+  EXPECT_EQ(readDataTable(other.read("basin_Chains.dat")).rows, readDataTable(chains).rows);
+  EXPECT_EQ(readDataTable(other.read("basin_Posterior.dat")).rows, readDataTable(posterior).rows);
+  EXPECT_EQ(other.read("basin_TotalBand_1.csv"), bands);
+}
+
+TEST(Dream, AnObjectiveFunctionMayBeTheLikelihoodAndFailedRunsHaveNone) {
+  const ModelFolder folder;
+  // The root mean square error is 2.7 at most: its own posterior is wide.
+  const std::string setup =
+      writeDream(folder, {.maxEvaluations = 400, .modelArguments = "--fail-above 9.9"}, "Likelihood = 'objective'");
+  const ProgramResult run = runProgram({setup});
+  ASSERT_EQ(run.exitCode, 0) << run.error;
+  const ReadTable table = readDataTable(folder.read("basin_Chains.dat"));
+  const ReadTable results = readDataTable(folder.read("basin.dat"));
+  for (const auto& row : table.rows) {
+    const double logLikelihood = realCell(row[*table.column("Log_Likelihood")]).value();
+    if (std::isinf(logLikelihood)) continue;
+    const auto number = static_cast<std::size_t>(realCell(row[*table.column("Evaluation")]).value());
+    EXPECT_NEAR(-logLikelihood, realCell(results.rows[number - 1][*results.column("flow")]).value(), 1e-5);
+    EXPECT_LE(realCell(row[*table.column("a")]).value(), 9.9);
+  }
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("their sets have likelihood 0 and were rejected"));
+  EXPECT_FALSE(folder.exists("basin_TotalBand_1.csv"));
+}
+
+TEST(Dream, WhatDoesNotFitIsRefusedBeforeTheFirstModelRun) {
+  struct Case {
+    std::string dream;
+    std::string message;
+  };
+  const std::vector<Case> cases{
+      {"Likelihood = 'normal'\n Error_Deviation = 2.0, 1.0",
+       "expected a lower bound below the upper one, found 2 and 1"},
+      {"Likelihood = 'normal'\n Error_Deviation = 1.0, 2.0, 3.0",
+       "one number (a fixed value) or two (bounds), found 3"},
+      {"Likelihood = 'AR(1)'\n Error_Correlation = 0.5, 1.0", "expected 0 to 0.9999, found 1"},
+      {"Likelihood = 'objective'\n Objective_Function = 2", "Objective_Function = 2: expected 0 to 1"},
+      {"Likelihood = 'normal'\n [ERROR_MODEL_2]\n Likelihood = 'Student'\n [/ERROR_MODEL_2]",
+       "ERROR_MODEL_2: expected the number of an output measure"},
+      {"Likelihood = 'Box-Cox'\n Box_Cox_Shift = -6.0", "expected a Box_Cox_Shift with which all observations"},
+  };
+  const ModelFolder folder;
+  for (const Case& own : cases) {
+    const ProgramResult run = runProgram({writeDream(folder, {.maxEvaluations = 200}, own.dream)});
+    EXPECT_EQ(run.exitCode, 1);
+    EXPECT_THAT(run.error, HasSubstr(own.message));
+    EXPECT_THAT(folder.read("basin.log"), Not(HasSubstr("No. 1 initiated")));
+  }
+  const ProgramResult small = runProgram({writeDream(folder, {.maxEvaluations = 39}, "Likelihood = 'normal'")});
+  EXPECT_THAT(small.error, HasSubstr("expected 10 model runs for each of the 4 chains or more, found 39"));
+}
+
+}  // namespace
+}  // namespace mirevo::testing
