@@ -261,6 +261,7 @@ test('a band breaks at its gaps, shows every observed value and says of how many
 
 test('GLUE says which parameters the observations tell something of, and how much of them lies in how wide a band', async () => {
   const data = sample.dataOf('glue');
+  data.glue.distanceLimit = 0.1;
   data.glue.parameters[0].distance = 0.5;
   data.glue.parameters[1].distance = 0.01;
   Object.assign(data.band[0], { inside: 0.75, n: 365, width: 2.5, relativeWidth: 0.8, unit: 'm3/s' });
