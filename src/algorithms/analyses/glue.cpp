@@ -73,7 +73,7 @@ SettingRefusal unknownJudge(std::string_view name, std::span<const OutputMeasure
 /// Why threshold or likelihood cannot be those of this judge.
 std::optional<SettingRefusal> misfit(const GlueJudge& judge, const GlueSettings& settings) {
   if (settings.likelihood == LikelihoodShape::efficiency && judge.best != Best::largest) {
-    return SettingRefusal{std::string(kLikelihoodRefusal), kLikelihoodKeyword,
+    return SettingRefusal{std::string(kLikelihoodRefusal), kGlueLikelihoodKeyword,
                           fmt::format("'efficiency' is for statistics whose best value is 1, found {}; 'inverse "
                                       "variance' is a likelihood of errors",
                                       judge.description)};

@@ -140,7 +140,7 @@ std::string behaviouralText(const GlueJudge& judge, const GlueSettings& settings
 std::string likelihoodText(const GlueSettings& settings) {
   if (settings.likelihood == LikelihoodShape::equal) return "likelihood: equal, all behavioural sets weigh the same";
   return fmt::format("likelihood: {}, shape factor {}",
-                     kLikelihoodNames[static_cast<std::size_t>(settings.likelihood)].name,
+                     kGlueLikelihoodNames[static_cast<std::size_t>(settings.likelihood)].name,
                      formatReal(settings.shapeFactor));
 }
 
@@ -213,14 +213,14 @@ std::vector<std::string> glueWarnings(const EvaluatedSample& sample, const GlueW
         fmt::format("{} of {} behavioural sets have a negative error, for which there is no likelihood "
                     "'{}', and weigh nothing; '{}' takes any value",
                     weights.undefinedCount, weights.behavioural.size(),
-                    kLikelihoodNames[static_cast<std::size_t>(settings.likelihood)].name,
-                    kLikelihoodNames[static_cast<std::size_t>(LikelihoodShape::rescaled)].name));
+                    kGlueLikelihoodNames[static_cast<std::size_t>(settings.likelihood)].name,
+                    kGlueLikelihoodNames[static_cast<std::size_t>(LikelihoodShape::rescaled)].name));
   }
   if (!weights.hasWeights()) {
     warnings.push_back(
         fmt::format("The likelihood of all {} behavioural sets is 0, and there are neither quantiles "
                     "nor bands. {}, and so does one with another {}",
-                    weights.behavioural.size(), again, kLikelihoodKeyword));
+                    weights.behavioural.size(), again, kGlueLikelihoodKeyword));
     return warnings;
   }
   const std::size_t weighing = weights.behavioural.size() - weights.unweightedCount;

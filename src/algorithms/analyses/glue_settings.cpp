@@ -77,11 +77,11 @@ const SettingSection<GlueSettings>& glueSection() {
             }),
         choice<GlueSettings>(
             [](GlueSettings& settings, const SetupValue& value) {
-              settings.likelihood = codeNamed<LikelihoodShape>(kLikelihoodNames, value);
+              settings.likelihood = codeNamed<LikelihoodShape>(kGlueLikelihoodNames, value);
             },
-            {.name = kLikelihoodKeyword,
+            {.name = kGlueLikelihoodKeyword,
              .defaultValue = "'inverse variance'",
-             .codes = kLikelihoodNames,
+             .codes = kGlueLikelihoodNames,
              .meaning = "Likelihood of a behavioural set, before all are scaled to the sum 1; see the page on GLUE.",
              .bearsOnResults = kNotOfResults}),
         setting<&GlueSettings::shapeFactor>(

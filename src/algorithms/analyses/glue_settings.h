@@ -22,11 +22,11 @@ enum class LikelihoodShape : std::int32_t {
   rescaled,         ///< (limit - distance)^N: 0 at the limit of what is behavioural
   equal             ///< 1
 };
-inline constexpr CodeName kLikelihoodNames[] = {{std::nullopt, "efficiency"},
-                                                {std::nullopt, "inverse variance"},
-                                                {std::nullopt, "exponential"},
-                                                {std::nullopt, "rescaled"},
-                                                {std::nullopt, "equal"}};
+inline constexpr CodeName kGlueLikelihoodNames[] = {{std::nullopt, "efficiency"},
+                                                    {std::nullopt, "inverse variance"},
+                                                    {std::nullopt, "exponential"},
+                                                    {std::nullopt, "rescaled"},
+                                                    {std::nullopt, "equal"}};
 
 /// The section UNCERTAINTY_ESTIMATION/GLUE. All but the sampling can be changed without another model run.
 struct GlueSettings {
@@ -43,7 +43,7 @@ inline constexpr std::string_view kGlueSectionName = "GLUE";
 inline constexpr std::string_view kJudgedByKeyword = "Judged_By";
 inline constexpr std::string_view kThresholdKeyword = "Behavioural_Threshold";
 inline constexpr std::string_view kShareKeyword = "Behavioural_Share";
-inline constexpr std::string_view kLikelihoodKeyword = "Likelihood";
+inline constexpr std::string_view kGlueLikelihoodKeyword = "Likelihood";
 inline constexpr std::string_view kEarlierRunKeyword = "Earlier_Result_File";
 inline constexpr std::string_view kBehaviouralRefusal = "Error: Choice of behavioural sets invalid";
 inline constexpr std::string_view kLikelihoodRefusal = "Error: Likelihood of behavioural sets invalid";

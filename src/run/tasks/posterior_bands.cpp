@@ -49,22 +49,6 @@ BandStates bandStates(const DreamSampler& sampler) {
   return found;
 }
 
-/// "   mean width 3.2, 21 % of the range of the observations"
-std::string widthText(const SeriesBand& band, const ObservedSeries& observed) {
-  double sum = 0.0;
-  double least = std::numeric_limits<double>::infinity();
-  double largest = -least;
-  for (std::size_t t = 0; t < observed.values.size(); ++t) {
-    if (std::isnan(observed.values[t]) || band.runs[t] == 0) continue;
-    sum += band.upper[t] - band.lower[t];
-    least = std::min(least, observed.values[t]);
-    largest = std::max(largest, observed.values[t]);
-  }
-  const double width = sum / static_cast<double>(band.observationCount);
-  return fmt::format("mean width {:.4g}, {:.1f} % of the range of the observations", width,
-                     100.0 * width / (largest - least));
-}
-
 class BandReport {
  public:
   BandReport(const TaskContext& context, bool hasSteps, std::vector<TaskFile>& files)
@@ -74,12 +58,12 @@ class BandReport {
     const std::string& name = context_.measures[observed.measure].name;
     files_.push_back({runFilePath(context_.filePrefix, file, static_cast<int>(observed.measure) + 1),
                       seriesBandText(name, observed, band, hasSteps_)});
-    if (band.observationCount == 0) {
+    if (band.coverage.observationCount == 0) {
       lines.push_back(fmt::format("{} of {}: no observation has a simulated value", what, name));
     } else {
       lines.push_back(fmt::format("{} of {}: {:.1f} % of {} observations lie between the 5 and the 95 % quantile, {}",
-                                  what, name, 100.0 * band.shareInside, band.observationCount,
-                                  widthText(band, observed)));
+                                  what, name, 100.0 * band.coverage.shareInside, band.coverage.observationCount,
+                                  bandWidthText(band.coverage)));
     }
     lines.push_back("   " + files_.back().path);
   }

@@ -8,7 +8,7 @@
 namespace mirevo {
 namespace {
 
-constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
+constexpr double kMissing = std::numeric_limits<double>::quiet_NaN();
 
 ErrorValues errors(std::initializer_list<std::pair<ErrorTerm, double>> set) {
   ErrorValues values = neutralErrors();
@@ -65,7 +65,7 @@ double lnMultivariateNormal(const std::vector<double>& values, const std::vector
 TEST(Likelihoods, OfCorrelatedErrorsIsThatOfTheStationaryProcessThroughGapsToo) {
   // A day is missing: the errors around it are two days apart.
   const std::vector<double> days{0.0, 1.0, 2.0, 3.0, 4.0};
-  const std::vector<double> observed{1.0, 2.5, kNaN, 2.0, 4.0};
+  const std::vector<double> observed{1.0, 2.5, kMissing, 2.0, 4.0};
   const std::vector<double> simulated{1.5, 2.0, 2.2, 2.5, 3.0};
   const double phi = 0.6;
   const double deviation = 0.4;
@@ -110,8 +110,8 @@ TEST(Likelihoods, InnovationsHaveTheirDensities) {
       {LikelihoodForm::generalised, neutralErrors(), 1.0, 1.0, 0.2419707245},
       // Double exponential with variance 1: exp(-sqrt(2) |a|) / sqrt(2).
       {LikelihoodForm::generalised, errors({{kKurtosis, 1.0}}), 1.0, 0.5, std::exp(-0.5 * root) / root},
-      {LikelihoodForm::generalised, errors({{kKurtosis, -0.5}, {kSkewness, 2.0}}), 1.0, kNaN, 0.0},
-      {LikelihoodForm::generalised, errors({{kKurtosis, 0.7}, {kSkewness, 0.4}}), 1.0, kNaN, 0.0},
+      {LikelihoodForm::generalised, errors({{kKurtosis, -0.5}, {kSkewness, 2.0}}), 1.0, kMissing, 0.0},
+      {LikelihoodForm::generalised, errors({{kKurtosis, 0.7}, {kSkewness, 0.4}}), 1.0, kMissing, 0.0},
   };
   for (const Case& own : cases) {
     const ErrorShape shape(own.form, own.values);
@@ -150,10 +150,10 @@ TEST(Likelihoods, InnovationsHaveTheirDensities) {
 
 TEST(Likelihoods, ARunWithoutAValueThatTheFirstOneHadHasNone) {
   SeriesErrors series(LikelihoodForm::normal, 0.0, kDays, kObserved);
-  series.countWhere(std::vector{kNaN, 2.0, 2.5, 3.0});
+  series.countWhere(std::vector{kMissing, 2.0, 2.5, 3.0});
   EXPECT_EQ(series.count(), 3U);
   EXPECT_TRUE(std::isfinite(series.logLikelihood(kSimulated, neutralErrors())));
-  EXPECT_EQ(series.logLikelihood(std::vector{1.5, kNaN, 2.5, 3.0}, neutralErrors()),
+  EXPECT_EQ(series.logLikelihood(std::vector{1.5, kMissing, 2.5, 3.0}, neutralErrors()),
             -std::numeric_limits<double>::infinity());
 }
 
