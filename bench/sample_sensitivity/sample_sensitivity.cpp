@@ -46,7 +46,9 @@ void tryFunction(const Function& function, int sampleSize, int repetitions) {
   std::vector<double> widths(p);
   const auto begin = std::chrono::steady_clock::now();
   for (int seed = 1; seed <= repetitions; ++seed) {
-    UncertaintySettings settings{SamplingType::simpleRandom, sampleSize, ParameterDistributions::uniform(space)};
+    UncertaintySettings settings;
+    settings.sampleSize = sampleSize;
+    settings.distributions = ParameterDistributions::uniform(space);
     UncertaintyOutcome outcome{uncertaintySample(settings, seed), {}};
     for (const ParameterSet& set : outcome.sample) {
       outcome.results.emplace_back().objectiveValues = {function.valueAt(set)};
