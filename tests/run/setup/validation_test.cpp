@@ -353,7 +353,9 @@ std::vector<RowInSetup> rowsInSetups(const std::string& setup) {
     const bool isOfDistributions = section->path.ends_with("Y_ESTIMATION/PARAMETER_n") ||
                                    section->path.ends_with("Y_ANALYSIS/PARAMETER_n") ||
                                    section->path.find("/CORRELATIONS") != std::string_view::npos;
-    if (isOfDistributions) continue;
+    // Its keywords are those of DREAM.
+    const bool isOfOneMeasure = section->path.ends_with("/ERROR_MODEL_n");
+    if (isOfDistributions || isOfOneMeasure) continue;
     std::string text = setup;
     for (const auto& [start, option] : kOptions) {
       if (section->path.starts_with(start)) {
@@ -363,6 +365,12 @@ std::vector<RowInSetup> rowsInSetups(const std::string& setup) {
     if (section->path.ends_with("/GLUE")) {
       text = SetupFixture::withValue(text, "UNCERTAINTY_ESTIMATION", "Uncertainty_Type", "'GLUE'");
       text = SetupFixture::withValue(text, "ObjectiveFunctions/OUTPUT_MEASURES/MEASURE_n", "Statistic_Type", "'NSE'");
+    }
+    if (section->path.starts_with("UNCERTAINTY_ESTIMATION")) {
+      text.insert(text.find("  [/UNCERTAINTY_ESTIMATION]"), "[DREAM]\nLikelihood = 'normal'\n[/DREAM]\n");
+    }
+    if (section->path.ends_with("/DREAM")) {
+      text = SetupFixture::withValue(text, "UNCERTAINTY_ESTIMATION", "Uncertainty_Type", "'DREAM'");
     }
     for (const auto& [start, algorithm] : kAlgorithms) {
       if (section->path.find(start) == std::string_view::npos) continue;
