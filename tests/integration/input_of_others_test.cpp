@@ -86,8 +86,8 @@ TEST_F(InputOfOthers, EverySearchStartsFromSetsOfAnEarlierRunAndGoesOnFromThem) 
   std::vector<std::vector<std::string>> best(earlier.begin(), earlier.end() - 1);  // without the final run
   std::ranges::stable_sort(best, {}, [](const auto& row) { return std::stod(row.back()); });
 
-  const std::tuple<const char*, int, std::size_t> searches[] = {
-      {"SCE", 1, 5}, {"PSE", 3, 5}, {"OPSE", 3, 5}, {"CMA-ES", 3, 5}, {"DDS", 1, 2}, {"PDDS", 3, 2}};
+  const std::tuple<const char*, int, std::size_t> searches[] = {{"SCE", 1, 5},    {"PSE", 3, 5}, {"OPSE", 3, 5},
+                                                                {"CMA-ES", 3, 5}, {"DDS", 1, 2}, {"PDDS", 3, 2}};
   for (const auto& [search, slots, startCount] : searches) {
     folder_.writeSetup({.search = search, .maxEvaluations = 40, .slots = slots});
     const bool hasPopulation = startCount == 5;

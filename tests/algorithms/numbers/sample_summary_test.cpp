@@ -125,7 +125,8 @@ TEST(SeriesBand, HasTheQuantilesOfWhatSucceededAndCountsTheObservationsInside) {
   EXPECT_THAT(seriesBandText("flow", {0, {2001, 1, 1}, {0.0, 1.0, 1.5, 2.0, 3.0}, values}, ofSteps, true),
               EndsWith("\n2001-01-02 12:00,,5.95,50.5,95.05,100\n2001-01-03 00:00,1,NaN,NaN,NaN,0\n"
                        "2001-01-04 00:00,,-95,-50,-5,101\n"));
-  EXPECT_TRUE(std::isnan(seriesBand(std::vector{1.0}, 0, [](auto...) { return std::vector<double>(); }).coverage.shareInside));
+  EXPECT_TRUE(
+      std::isnan(seriesBand(std::vector{1.0}, 0, [](auto...) { return std::vector<double>(); }).coverage.shareInside));
 }
 
 }  // namespace
