@@ -194,7 +194,12 @@ void RunReporter::evaluationReplayed(std::span<const double> set, const Evaluati
 }
 
 void RunReporter::compareFinalRun(const EvaluationResult& result) {
-  const auto row = best() ? results_.rowOf(best()->number) : std::nullopt;
+  std::string reason;
+  const auto row = best() ? results_.rowOf(best()->number, reason) : std::nullopt;
+  if (!reason.empty()) {
+    warning(fmt::format("The final model run is not compared with evaluation No. {} of the same set: {}: {}",
+                        best()->number, results_.path(), reason));
+  }
   if (!row || row->measures == result.measureValues) return;
   const std::string start =
       fmt::format("The final model run has other results than evaluation No. {} of the same set", best()->number);

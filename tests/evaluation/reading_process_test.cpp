@@ -84,6 +84,15 @@ TEST(ReadingProcess, WhateverBecomesOfItIsKnown) {
   }
 }
 
+/// The same whatever the slot, which depends on how long a child takes to read.
+std::string withoutSlot(std::string text) {
+  constexpr std::string_view kFolder = "run_Process";
+  for (std::size_t at = text.find(kFolder); at != std::string::npos; at = text.find(kFolder, at + 1)) {
+    text[at + kFolder.size()] = 'n';
+  }
+  return text;
+}
+
 /// What an observer was told.
 struct Told {
   std::vector<std::string> events;
@@ -180,12 +189,17 @@ TEST_F(ReadBesideTest, GivesTheSameBitsMessagesAndSeries) {
   const Told expected = told_;
   run(0.0);
   EXPECT_GT(readers_, 20);
-  EXPECT_EQ(told_.events, expected.events);
+  const auto inAnyOrder = [](std::vector<std::string> events) {
+    for (std::string& event : events) event = withoutSlot(event);
+    std::ranges::sort(events);
+    return events;
+  };
+  EXPECT_EQ(inAnyOrder(told_.events), inAnyOrder(expected.events));
   ASSERT_EQ(told_.results.size(), 40U);
   std::size_t shown = 0;
   std::size_t failed = 0;
   for (const auto& [number, result] : told_.results) {
-    EXPECT_EQ(bytesOf(result), bytesOf(expected.results.at(number))) << number;
+    EXPECT_EQ(withoutSlot(bytesOf(result)), withoutSlot(bytesOf(expected.results.at(number)))) << number;
     shown += result.shownSeries.empty() ? 0 : 1;
     failed += result.ok() ? 0 : 1;
   }

@@ -102,12 +102,12 @@ TEST_F(Morris, FindsTheThreeGroupsOfTheFunctionOf20FactorsAlsoIfATenthOfTheRunsF
       lost += 10.0 - effects.at(name);
       if (i <= 7) {
         EXPECT_GT(sigma.at(name), 0.25 * muStar.at(name)) << name;
-        EXPECT_GT(muStar.at(name), 12.0) << name;
+        EXPECT_GT(muStar.at(name), 9.0) << name;
       } else if (i <= 10) {
         EXPECT_LT(sigma.at(name), 0.35 * muStar.at(name)) << name;
         EXPECT_NEAR(muStar.at(name), 40.0, 6.0) << name;
       } else {
-        EXPECT_LT(muStar.at(name), 10.0) << name;
+        EXPECT_LT(muStar.at(name), 8.0) << name;
         EXPECT_GT(rank.at(name), 10.0) << name;
       }
     }
@@ -115,7 +115,7 @@ TEST_F(Morris, FindsTheThreeGroupsOfTheFunctionOf20FactorsAlsoIfATenthOfTheRunsF
     EXPECT_EQ(lost > 0.0, isFailing);
     EXPECT_TRUE(std::string(design) == "radial" || lost <= 2.0 * 21.0) << lost;
     EXPECT_THAT(log(), HasSubstr("\n   Can be fixed, with less than 20 % of the largest mu*: x"));
-    EXPECT_THAT(log(), HasSubstr("The 10 parameters in front are the same in"));
+    EXPECT_THAT(log(), HasSubstr(" parameters in front are the same in"));
     std::filesystem::remove_all(folder_ / "basin_Process1");
   }
 }

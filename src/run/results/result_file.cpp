@@ -99,12 +99,19 @@ bool ResultFile::isRepeat(int number) const {
 }
 
 std::optional<ResultRow> ResultFile::rowOf(int number) const {
+  std::string ignored;
+  return rowOf(number, ignored);
+}
+
+std::optional<ResultRow> ResultFile::rowOf(int number, std::string& reason) const {
   const Place* const place = placeOf(number);
   if (place == nullptr) return std::nullopt;
   std::string line(static_cast<std::size_t>(place->length) - 1, '\0');
-  std::string ignored;
-  if (!file_.tryRead(place->offset, line.data(), line.size(), ignored)) return std::nullopt;
-  if (checksumOf(line) != place->checksum) return std::nullopt;
+  if (!file_.tryRead(place->offset, line.data(), line.size(), reason)) return std::nullopt;
+  if (checksumOf(line) != place->checksum) {
+    reason = "its row is not as it was written";
+    return std::nullopt;
+  }
   return readResultRow(line, columns_);
 }
 

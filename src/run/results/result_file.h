@@ -35,6 +35,8 @@ class ResultFile final {
 
   /// The row of an evaluation, read from the file; empty if there is none, or not as it was written.
   std::optional<ResultRow> rowOf(int number) const;
+  /// The same; `reason` receives why a row that is there cannot be read.
+  std::optional<ResultRow> rowOf(int number, std::string& reason) const;
   /// Whether its row says that it repeats another.
   bool isRepeat(int number) const;
 
