@@ -93,6 +93,12 @@ std::string withoutSlot(std::string text) {
   return text;
 }
 
+std::vector<std::string> inAnyOrder(std::vector<std::string> events) {
+  for (std::string& event : events) event = withoutSlot(event);
+  std::ranges::sort(events);
+  return events;
+}
+
 /// What an observer was told.
 struct Told {
   std::vector<std::string> events;
@@ -189,11 +195,6 @@ TEST_F(ReadBesideTest, GivesTheSameBitsMessagesAndSeries) {
   const Told expected = told_;
   run(0.0);
   EXPECT_GT(readers_, 20);
-  const auto inAnyOrder = [](std::vector<std::string> events) {
-    for (std::string& event : events) event = withoutSlot(event);
-    std::ranges::sort(events);
-    return events;
-  };
   EXPECT_EQ(inAnyOrder(told_.events), inAnyOrder(expected.events));
   ASSERT_EQ(told_.results.size(), 40U);
   std::size_t shown = 0;
@@ -218,9 +219,9 @@ TEST_F(ReadBesideTest, ReadsAgainWhatAKilledProcessHasRead) {
   };
   run(0.0);
   EXPECT_GT(killed, 10);
-  EXPECT_EQ(told_.events, expected.events);
+  EXPECT_EQ(inAnyOrder(told_.events), inAnyOrder(expected.events));
   for (const auto& [number, result] : told_.results) {
-    EXPECT_EQ(bytesOf(result), bytesOf(expected.results.at(number))) << number;
+    EXPECT_EQ(withoutSlot(bytesOf(result)), withoutSlot(bytesOf(expected.results.at(number)))) << number;
   }
 }
 
