@@ -353,7 +353,10 @@ TaskContext RunDriver::taskContext() {
 }
 
 const TaskOutcome& RunDriver::runTask() {
-  if (!config_.task) return outcome_.emplace(TaskOutcome{std::string(kEndOfTask)});
+  if (!config_.task) {
+    outcome_ = TaskOutcome{std::string(kEndOfTask)};
+    return *outcome_;
+  }
   outcome_ = config_.task->run(taskContext());
   const bool hasWorkers = state_.job->hasWorkers();
   const int slots = hasWorkers ? state_.job->processCount() - 1 : config_.simultaneousSimulations;

@@ -72,7 +72,7 @@ const SettingSection<GlueSettings>& glueSection() {
                             "that is behavioural. Equally good ones at the limit all are.",
                  .bearsOnResults = kNotOfResults}),
             [](const GlueSettings& settings) -> std::optional<SettingRefusal> {
-              if (const auto refusal = validateBehavioural(settings)) return refusal;
+              if (auto refusal = validateBehavioural(settings)) return refusal;
               return validateShare(settings);
             }),
         choice<GlueSettings>(

@@ -69,7 +69,7 @@ MorrisOutcome screenParameters(const EffectPlan& plan, const EffectResults& resu
 
   std::vector<std::vector<EffectPair>> pairs;
   for (const EffectTrajectory& trajectory : plan.trajectories) {
-    std::vector<EffectPair>& ofTrajectory = pairs.emplace_back();
+    std::vector<EffectPair> ofTrajectory;
     for (const EffectPair& pair : pairsOf(plan, trajectory)) {
       ++outcome.plannedEffects;
       if (results[placeOf(pair.from)].ok() && results[placeOf(pair.to)].ok()) {
@@ -78,6 +78,7 @@ MorrisOutcome screenParameters(const EffectPlan& plan, const EffectResults& resu
         ++outcome.lostEffects;
       }
     }
+    pairs.push_back(std::move(ofTrajectory));
   }
   const Resamples resamples =
       drawResamples(plan.trajectories.size(), static_cast<std::size_t>(settings.bootstrapSamples), seed);

@@ -237,10 +237,12 @@ void addDependences(const std::vector<std::vector<double>>& modelValues, const s
                     const Columns& outputs, std::int32_t seed, std::span<OutputDependence*> found) {
   const std::size_t p = found.front()->parameters.size();
   Columns outputRanks;
+  outputRanks.reserve(outputs.size());
   for (const std::vector<double>& output : outputs) outputRanks.push_back(ranksOf(orderOf(output)));
   std::vector<Order> orders;
   for (std::size_t j = 0; j < p; ++j) {
     std::vector<double> values;
+    values.reserve(rows.size());
     for (const std::size_t row : rows) values.push_back(modelValues[row][j]);
     const Order& order = orders.emplace_back(orderOf(values));
     const std::vector<double> ranks = ranksOf(order);

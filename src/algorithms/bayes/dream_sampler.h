@@ -73,7 +73,7 @@ class ChainHistory final {
   void add(const State& state);
   std::size_t chainCount() const { return chainCount_; }
   std::size_t dimension() const { return dimension_; }
-  std::size_t generations() const { return logLikelihoods_.size() / chainCount_; }
+  std::size_t generations() const { return chainCount_ == 0 ? 0 : logLikelihoods_.size() / chainCount_; }
   State at(std::size_t generation, std::size_t chain) const;
   /// The values of one dimension in every `stride`-th generation from `first` on, one vector per chain.
   std::vector<std::vector<double>> columns(std::size_t dimension, std::size_t first, std::size_t stride = 1) const;

@@ -4,6 +4,7 @@
 #include <cmath>
 #include <cstdint>
 #include <limits>
+#include <utility>
 
 #include <fmt/format.h>
 
@@ -121,9 +122,10 @@ void appendQuantiles(const ShownDimensions& dimensions, const PosteriorSummary& 
   std::vector<std::vector<double>> rows;
   for (std::size_t j = 0; j < dimensions.names.size(); ++j) {
     const PosteriorSummary::Dimension& own = summary.dimensions[j];
-    std::vector<double>& row = rows.emplace_back(std::vector<double>{own.mean, own.standardDeviation});
+    std::vector<double> row{own.mean, own.standardDeviation};
     row.insert(row.end(), own.quantiles.begin(), own.quantiles.end());
     row.insert(row.end(), {summary.mostProbable[j], own.rHat, std::round(own.effectiveSize)});
+    rows.push_back(std::move(row));
   }
   lines.emplace_back();
   for (std::string& line : formatTable("Posterior", headings, dimensions.names, rows)) lines.push_back(std::move(line));

@@ -338,7 +338,7 @@ std::optional<SettingRefusal> validateDistribution(const DistributionSettings& s
                                       "Distribution_Scale = 'search', as {} is logarithmic",
                                       space.names[j])};
   }
-  if (const auto refusal = validateLimits(settings, target)) return refusal;
+  if (auto refusal = validateLimits(settings, target)) return refusal;
   return validateValues(settings, space, j, target);
 }
 

@@ -6,6 +6,7 @@
 #include <limits>
 #include <numeric>
 #include <tuple>
+#include <utility>
 
 namespace mirevo {
 namespace {
@@ -78,7 +79,7 @@ std::vector<std::vector<double>> weightedCorrelations(std::span<const std::vecto
   for (const std::vector<double>& column : columns) {
     double mean = 0.0;
     for (std::size_t i = 0; i < column.size(); ++i) mean += weights[i] / sum * column[i];
-    std::vector<double>& one = scaled.emplace_back(column.size());
+    std::vector<double> one(column.size());
     for (std::size_t i = 0; i < column.size(); ++i) one[i] = (column[i] - mean) * std::sqrt(weights[i] / sum);
     const double length = std::sqrt(std::inner_product(one.begin(), one.end(), one.begin(), 0.0));
     const auto largest =
@@ -86,6 +87,7 @@ std::vector<std::vector<double>> weightedCorrelations(std::span<const std::vecto
     // What is left of a constant column is rounding.
     const bool isConstant = column.empty() || length <= kRounding * std::abs(*largest);
     for (double& value : one) value = isConstant ? kNoValue : value / length;
+    scaled.push_back(std::move(one));
   }
   std::vector<std::vector<double>> matrix(columns.size(), std::vector<double>(columns.size(), 1.0));
   for (std::size_t i = 0; i < columns.size(); ++i) {

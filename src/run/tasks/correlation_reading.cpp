@@ -89,11 +89,13 @@ std::size_t parameterNamed(const std::string& name, std::string_view keyword, co
                            const SearchSpace& space) {
   const auto found = std::ranges::find_if(
       space.names, [&](const std::string& other) { return equalIgnoringCase(other, trimTrailing(name)); });
-  if (found != space.names.end()) return static_cast<std::size_t>(found - space.names.begin());
-  const auto nearest = nearestName(name, space.names);
-  section.refuse("Error: Unknown parameter in correlations", keyword,
-                 fmt::format("expected the name of a variable parameter, found {}{}", quotedForMessage(name),
-                             nearest ? fmt::format(", did you mean {}?", quotedForMessage(*nearest)) : ""));
+  if (found == space.names.end()) {
+    const auto nearest = nearestName(name, space.names);
+    section.refuse("Error: Unknown parameter in correlations", keyword,
+                   fmt::format("expected the name of a variable parameter, found {}{}", quotedForMessage(name),
+                               nearest ? fmt::format(", did you mean {}?", quotedForMessage(*nearest)) : ""));
+  }
+  return static_cast<std::size_t>(found - space.names.begin());
 }
 
 /// Fills the matrix with the correlations of the table's parameters that are variable, and returns their number. Throws
