@@ -83,7 +83,7 @@ void appendConvergence(const DreamSettings& settings, const ShownDimensions& dim
     lines.push_back(fmt::format(
         "Warning: The chains have not converged: R-hat is above {:g} for {}. The quantiles below are not those of the "
         "posterior yet. Raise Sample_Size; where R-hat stays large, the posterior may have several peaks (more chains "
-        "help: Chain_Count) or burn-in is too short (Burn_In_Share), which the traces of the report show",
+        "help: Chain_Count) or burn-in is too short (Burn_In_Share), which the states in _Chains.dat show",
         settings.rHatLimit, apart));
   }
   if (!few.empty()) {
