@@ -21,10 +21,13 @@ Enum named(const CodeName (&names)[Count], const SetupValue& value) {
   return static_cast<Enum>(found);
 }
 
-constexpr const char* kTermMeanings[] = {
+constexpr char kDeviationMeaning[] =
     "Standard deviation of the errors; in the unit of the transformed series with `Box_Cox_Lambda`; with "
     "`Error_Share` its part that is the same for all values; with `Likelihood = 'Student'` the scale. By default "
-    "between 0.001 and 10 times the standard deviation of the observations. The prior is uniform for its logarithm.",
+    "between 0.001 and 10 times the standard deviation of the observations. The prior is uniform for its logarithm.";
+
+constexpr const char* kTermMeanings[] = {
+    kDeviationMeaning,
     "Part of the standard deviation that grows with the simulated value.",
     "Correlation of the errors of one observation and the next.",
     "Lambda of the Box-Cox transformation of simulated and observed values; 1: none, 0: logarithm.",
