@@ -17,7 +17,6 @@ namespace mirevo {
 namespace {
 
 constexpr std::string_view kPopulationRefusal = "Error: Population size in CMA-ES algorithm invalid";
-constexpr std::string_view kBudgetUsedUp = "Optimisation terminated: Maximum number of model evaluations reached";
 
 /// Runs of which the log tells one by one.
 constexpr int kMostNotedRuns = 40;
@@ -157,7 +156,7 @@ SearchStatus CmaEs::advance() {
   if (!isCut) learnFrom(points);
   if (budgetLeft() <= 0) {
     noteRun("was going on when the budget was used up");
-    summary_.terminationMessage = kBudgetUsedUp;
+    summary_.terminationMessage = kBudgetUsedMessage;
   } else if (!tests_->reason().empty()) {
     endRun(tests_->reason());
   } else if (change_->isMet()) {

@@ -186,7 +186,7 @@ void Dds::checkBudget() {
   summary_.replacedCount = feasible_.replacedCount();
   summary_.returnedCount = feasible_.returnedCount();
   if (summary_.evaluationCount >= maxEvaluations_) {
-    summary_.terminationMessage = "Optimisation terminated: Maximum number of model evaluations reached";
+    summary_.terminationMessage = kBudgetUsedMessage;
   }
 }
 

@@ -46,7 +46,7 @@ void StoppingTests::update(double bestValue, int evaluationCount, double populat
   }
 
   if (evaluationCount >= criteria_.maxEvaluations) {
-    message_ = "Optimisation terminated: Maximum number of model evaluations reached";
+    message_ = kBudgetUsedMessage;
   }
   if (criteria_.minChange > relativeChange_) {
     message_ = "Optimisation terminated: Objective function convergence criterion met";

@@ -18,6 +18,9 @@ struct StoppingCriteria {
 
 /// The keyword of `maxEvaluations`.
 inline constexpr std::string_view kBudgetKeyword = "Max_No_Evaluations";
+/// Why a search stops that has used its budget up.
+inline constexpr std::string_view kBudgetUsedMessage =
+    "Optimisation terminated: Maximum number of model evaluations reached";
 /// The section STOPPING_CRITERIA.
 const SettingSection<StoppingCriteria>& stoppingSection();
 

@@ -167,7 +167,9 @@ bool TextTable::readHeader(const TextLayout::Line& line, TimeReading& times) {
   if (cells_.size() > kMostColumns) {
     return fail(line.number, fmt::format("at most {} columns", kMostColumns), std::to_string(cells_.size()));
   }
-  const bool isLine = std::all_of(cells_.begin(), cells_.end(), isRuler);
+  // The only header row has names, whatever they look like.
+  const bool mayRule = form_.headerRows > 1;
+  const bool isLine = mayRule && std::all_of(cells_.begin(), cells_.end(), isRuler);
   // Where blanks separate, a name that is missing shifts those behind it.
   if (!isLine && !names_.empty() && layout_->separator() == ' ' && cells_.size() != names_.size()) {
     return fail(line.number,
@@ -179,7 +181,7 @@ bool TextTable::readHeader(const TextLayout::Line& line, TimeReading& times) {
   if (!isLine) {
     names_.resize(std::max(names_.size(), cells_.size()));
     for (std::size_t i = 0; i < cells_.size(); ++i) {
-      if (cells_[i].empty() || isRuler(cells_[i])) continue;
+      if (cells_[i].empty() || (mayRule && isRuler(cells_[i]))) continue;
       if (!names_[i].empty()) names_[i] += ' ';
       names_[i] += cells_[i];
     }

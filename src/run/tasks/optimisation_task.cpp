@@ -17,6 +17,7 @@
 #include "run/access/file_validation.h"
 #include "run/tasks/infeasible_sets.h"
 #include "run/tasks/off_grid.h"
+#include "run/tasks/watched_evaluator.h"
 
 namespace mirevo {
 namespace {
@@ -475,9 +476,9 @@ void OptimisationTask::requireSets(const SearchSpace& space, const Feasibility& 
   method->make(problemOf(space, feasibility, evaluator, random))->initialise();
 }
 
-SearchSummary OptimisationTask::search(const TaskContext& context) const {
+SearchSummary OptimisationTask::search(const TaskContext& context, Evaluator& evaluator) const {
   UniformGenerator random(randomSeed);
-  SearchProblem problem = problemOf(context.space, context.feasibility, context.evaluator, random);
+  SearchProblem problem = problemOf(context.space, context.feasibility, evaluator, random);
   warnOfGivenSets(context, problem);
   std::optional<ProposalSelector> selector;
   if (usesSurrogate()) problem.selector = &selector.emplace(surrogate, problem.bounds, problem.feasibility);
@@ -487,10 +488,13 @@ SearchSummary OptimisationTask::search(const TaskContext& context) const {
 TaskOutcome OptimisationTask::run(const TaskContext& context) {
   if (surrogateUse != SurrogateUse::no && surrogateUse != SurrogateUse::yes) return {std::string(kEndOfTask)};
 
-  const SearchSummary summary = search(context);
+  WatchedEvaluator evaluator(context.evaluator);
+  const SearchSummary summary = search(context, evaluator);
   context.log.line("");
   for (const std::string& note : summary.notes) context.log.line(note);
   context.log.line(summary.terminationMessage);
+  const bool isBudgetUsed = summary.terminationMessage == kBudgetUsedMessage;
+  for (const std::string& line : courseLines(evaluator.course(), isBudgetUsed)) context.log.line(line);
   if (summary.replacedCount > 0) {
     context.log.line(fmt::format(
         "Proposed points that cannot be run (a constraint is violated, or an equation has no finite value) and were "

@@ -55,7 +55,7 @@ class OptimisationTask final : public Task {
   void warnOfGivenSets(const TaskContext& context, const SearchProblem& problem) const;
   SearchProblem problemOf(const SearchSpace& space, const Feasibility& feasibility, Evaluator& evaluator,
                           UniformGenerator& random) const;
-  SearchSummary search(const TaskContext& context) const;
+  SearchSummary search(const TaskContext& context, Evaluator& evaluator) const;
 
   std::optional<std::string> sampleText_;         ///< of a sample file, which is read once
   std::vector<std::vector<double>> givenValues_;  ///< those of a file, one entry per model parameter

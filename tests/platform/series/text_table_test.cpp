@@ -97,6 +97,11 @@ TEST(TextTable, NamesOfSeveralHeaderRowsAreJoinedAndRulersLeftOut) {
   TextTable unnamed(given({.headerRows = 0, .timeColumn = "2"}));
   ASSERT_TRUE(unnamed.parse("q.txt", "1,2000-01-01,2\n"));
   EXPECT_EQ(unnamed.itemName(2), "column 3");
+  // Of a single header row every name counts.
+  TextTable single(given({.columnSeparator = ";"}));
+  ASSERT_TRUE(single.parse("q.txt", "time;-;=\n2000-01-01;1;2\n"));
+  EXPECT_EQ(single.itemName(1), "-");
+  EXPECT_EQ(single.itemName(2), "=");
 }
 
 TEST(TextTable, RefusesWithThePlaceAndWhatWasExpected) {

@@ -1,0 +1,96 @@
+#include "algorithms/searches/best_course.h"
+
+#include <algorithm>
+#include <cmath>
+
+#include <fmt/core.h>
+
+#include "common/text.h"
+#include "evaluation/evaluation_result.h"
+
+namespace mirevo {
+namespace {
+
+constexpr int kFewestEvaluations = 20;  ///< below that halves and tenths say nothing
+constexpr double kNoted = 1.0e-3;       ///< share of the best value below which a fall is called small
+
+/// "from 0.52 to 0.48 (7.7 %)"; the share is that of a positive value.
+std::string fallText(double from, double to) {
+  std::string text = fmt::format("from {:.6g} to {:.6g}", from, to);
+  if (to > 0.0) text += fmt::format(" ({:.2g} %)", 100.0 * (from - to) / from);
+  return text;
+}
+
+}  // namespace
+
+void BestCourse::add(double aggregate) {
+  ++evaluationCount_;
+  if (!(aggregate < kFailedRunValue) || (!steps_.empty() && !(aggregate < steps_.back().aggregate))) return;
+  steps_.push_back({evaluationCount_, aggregate});
+}
+
+void BestCourse::clear() {
+  evaluationCount_ = 0;
+  steps_.clear();
+}
+
+double BestCourse::bestAfter(double evaluations) const {
+  const auto later = std::upper_bound(steps_.begin(), steps_.end(), evaluations,
+                                      [](double count, const Step& step) { return count < step.evaluation; });
+  return later == steps_.begin() ? kFailedRunValue : std::prev(later)->aggregate;
+}
+
+double BestCourse::expectedFall() const {
+  if (steps_.empty()) return 0.0;
+  const double end = steps_.back().aggregate;
+  const double half = bestAfter(0.5 * evaluationCount_);
+  const double quarter = bestAfter(0.25 * evaluationCount_);
+  if (quarter >= kFailedRunValue) return 0.0;
+  const double later = half - end;
+  const double earlier = quarter - half;
+  return earlier > later ? later * later / earlier : later;
+}
+
+std::vector<std::string> courseLines(const BestCourse& course, bool isBudgetUsed) {
+  const int count = course.evaluationCount();
+  if (course.steps().empty() || count < kFewestEvaluations) return {};
+  const double best = course.steps().back().aggregate;
+  const double half = course.bestAfter(0.5 * count);
+  const double tenth = course.bestAfter(0.9 * count);
+  std::vector<std::string> lines;
+  const std::string found = fmt::format("found by evaluation {} of {}", course.steps().back().evaluation, count);
+  if (half >= kFailedRunValue) {
+    lines.push_back(
+        fmt::format("Course: the best value, {}, was {}; none of the first half succeeded", formatReal(best), found));
+  } else if (half == best) {
+    lines.push_back(fmt::format("Course: the best value, {}, was {}; the second half found no better one",
+                                formatReal(best), found));
+  } else {
+    lines.push_back(fmt::format(
+        "Course: in the second half of the evaluations the best value fell {}, {}; it was {}", fallText(half, best),
+        tenth == best ? std::string("in the last tenth it did not") : "in the last tenth " + fallText(tenth, best),
+        found));
+  }
+  if (!isBudgetUsed) {
+    lines.emplace_back(
+        "A larger budget would not have changed this: the search had ended by itself. Whether there is a better value "
+        "elsewhere, other values of Random_Seed can tell");
+    return lines;
+  }
+  const double fall = course.expectedFall();
+  if (half >= kFailedRunValue) return lines;
+  if (fall <= kNoted * std::abs(best)) {
+    lines.emplace_back(
+        "The best value has come to rest. A longer run may yet leave its valley, and other values of Random_Seed can "
+        "tell "
+        "whether there is a better one elsewhere");
+  } else {
+    lines.push_back(fmt::format(
+        "If it went on falling as it did, {} more evaluations would bring it to about {:.3g}. Such a trend is "
+        "rough: what comes is often a fraction of it, and now and then several times as much",
+        count, best - fall));
+  }
+  return lines;
+}
+
+}  // namespace mirevo
