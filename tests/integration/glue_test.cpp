@@ -129,16 +129,21 @@ TEST(Glue, ACancelledRunHasItsStatisticsAndGoesOnToTheSameBits) {
   EXPECT_EQ(folder.found(), whole.found());
 }
 
+/// Makes the files of the run those of another.
+void renameResults(const GlueFolder& folder, const std::string& name) {
+  for (const auto& entry : std::filesystem::directory_iterator(folder.path())) {
+    const std::string file = entry.path().filename().string();
+    if (!file.starts_with("basin") || file.ends_with(".kdx") || entry.is_directory()) continue;
+    std::filesystem::rename(entry.path(), folder / (name + file.substr(5)));
+  }
+}
+
 TEST(Glue, OfTheFilesOfAnEarlierRunNeedsNoModelRun) {
   const GlueFolder folder;
   const std::string keywords = "Behavioural_Threshold = 2\nLikelihood = 'rescaled'";
   ASSERT_EQ(runProgram({folder.writeGlue(keywords)}).exitCode, 0);
   const std::string found = folder.found();
-  for (const auto& entry : std::filesystem::directory_iterator(folder.path())) {
-    const std::string name = entry.path().filename().string();
-    if (!name.starts_with("basin") || name.ends_with(".kdx") || entry.is_directory()) continue;
-    std::filesystem::rename(entry.path(), folder / ("first" + name.substr(5)));
-  }
+  renameResults(folder, "first");
   const std::string keptResults = folder.read("first.dat");
   const std::string values = folder.read("first_Simulated.bin");
   folder.useScript("exit 1");
@@ -177,6 +182,39 @@ TEST(Glue, OfTheFilesOfAnEarlierRunNeedsNoModelRun) {
   refused("it has rows that do not hold:\n   line ");
   folder.writeGlue(keywords + "\nEarlier_Result_File = 'basin.dat'");
   refused("Restart = 1 takes them over");
+}
+
+TEST(Glue, CountsASetOfAnEarlierSampleAsOftenAsItWasDrawn) {
+  const GlueFolder folder;
+  const std::string keywords = "Behavioural_Threshold = 20\nLikelihood = 'equal'";
+  const auto write = [&](const std::string& more) {
+    folder.writeGlue(keywords + more);
+    folder.editSetup("[/GLUE]",
+                     "[/GLUE]\n    [PARAMETER_1]\n      Distribution = 'discrete'\n      Values = 4, 4.5, 7\n"
+                     "      Weights = 8, 1, 1\n    [/PARAMETER_1]");
+  };
+  write("");
+  const ProgramResult first = runProgram({folder / "basin.kdx"});
+  ASSERT_EQ(first.exitCode, 0) << first.error;
+  const std::string found = folder.found();
+  EXPECT_EQ(folder.quantile("parameter", "a", "50 %"), 4.0);
+  renameResults(folder, "first");
+  write("\nEarlier_Result_File = 'first.dat'");
+  const ProgramResult again = runProgram({folder / "basin.kdx"});
+  ASSERT_EQ(again.exitCode, 0) << again.error;
+  EXPECT_EQ(folder.found(), found);
+}
+
+TEST(Glue, OfChainsSaysThatTheirProposalsAreNoSample) {
+  const GlueFolder folder;
+  folder.writeGlue("Behavioural_Share = 0.2", {.maxEvaluations = 200});
+  folder.editSetup("Uncertainty_Type = 'GLUE'", "Uncertainty_Type = 'DREAM'\n    [DREAM]\n      Likelihood = 'normal'\n    [/DREAM]");
+  const ProgramResult chains = runProgram({folder / "basin.kdx"});
+  ASSERT_EQ(chains.exitCode, 0) << chains.error;
+  renameResults(folder, "first");
+  folder.writeGlue("Behavioural_Share = 0.2\nEarlier_Result_File = 'first.dat'");
+  ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0);
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("those of a DREAM run, the proposals of its chains"));
 }
 
 TEST(Glue, OfASearchSaysThatItsSetsAreNoSampleOfTheParameters) {

@@ -322,7 +322,8 @@ void Statistics::takeShare(std::size_t j, std::span<const Sums> sums) {
   p.share.lower = p.share.upper = p.share.value;
   if (j == *reference_ || c.muStar == 0.0) {
     const bool isNegligible = p.share.value < negligible_;
-    p.certainty = isNegligible ? 1.0 : 0.0;
+    // Of effects that are all 0 the limits know nothing of a corner that no step has met.
+    if (j == *reference_) p.certainty = isNegligible ? 1.0 : 0.0;
     p.verdict = isNegligible ? ScreeningVerdict::fix : ScreeningVerdict::keep;
     shares_[j].assign(resamples_.size(), isNegligible);
     return;
@@ -407,9 +408,10 @@ void Statistics::judgeTogether() {
   bool isAny = false;
   double least = 1.0;
   for (std::size_t j = 0; j < columns_.size(); ++j) {
-    if (found_.parameters[j].verdict != ScreeningVerdict::fix) continue;
+    const ParameterEffects& one = found_.parameters[j];
+    if (one.verdict != ScreeningVerdict::fix || std::isnan(one.certainty)) continue;
     isAny = true;
-    least = std::min(least, found_.parameters[j].certainty);
+    least = std::min(least, one.certainty);
     for (std::size_t b = 0; b < agree.size(); ++b) agree[b] = agree[b] && shares_[j][b];
   }
   if (!isAny) return;

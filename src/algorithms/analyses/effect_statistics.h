@@ -27,7 +27,8 @@ struct ParameterEffects {
   LimitedValue muStar;    ///< the mean of their absolute values
   LimitedValue sigma;     ///< their standard deviation, divisor n - 1
   LimitedValue share;     ///< mu* over the largest mu*
-  /// How sure it is that the share is below the negligible one: the confidence of an upper limit that equals that.
+  /// How sure it is that the share is below the negligible one: the confidence of an upper limit that equals that. NaN
+  /// where all effects are 0.
   double certainty = std::numeric_limits<double>::quiet_NaN();
   ScreeningVerdict verdict = ScreeningVerdict::none;
   std::size_t rank = 0;  ///< by mu*, from 1; 0: it has no effects
@@ -43,7 +44,8 @@ struct OutputEffects {
   /// largest mu* are theirs.
   std::size_t topCount = 0;
   double topStability = std::numeric_limits<double>::quiet_NaN();
-  /// How sure it is that the shares of all parameters that may be fixed are negligible together; NaN without any.
+  /// How sure it is that the shares of all parameters that may be fixed are negligible together, but for those whose
+  /// effects are all 0; NaN without any.
   double fixedTogether = std::numeric_limits<double>::quiet_NaN();
   /// Trajectories that would decide the undecided parameters if the values hold; 0 where there are none.
   double trajectoriesToDecide = 0.0;

@@ -55,7 +55,8 @@ class Planner {
  private:
   /// A trajectory on levels.
   struct Chain {
-    std::vector<std::uint8_t> level;
+    std::vector<double> from;
+    std::vector<double> to;
     std::vector<std::uint32_t> order;
     std::vector<float> centroid;
   };
@@ -78,10 +79,7 @@ class Planner {
   std::vector<Chain> drawChains();
   static double spreadOf(std::span<const Chain> chains, double enough);
   void follow(const Chain& chain);
-  double ofLevel(int level) const { return (level + 0.5) / settings_.levels; }
-  int stepped(int level) const {
-    return level < settings_.levels / 2 ? level + settings_.levels / 2 : level - settings_.levels / 2;
-  }
+  double steppedFrom(double u);
 
   const MorrisSettings& settings_;
   const SearchSpace& space_;
@@ -213,6 +211,16 @@ void Planner::planRadial() {
   }
 }
 
+/// By a quarter to three quarters of the levels, beyond the last of which comes the first. With steps of one width an
+/// output that repeats itself at that distance would show no effect.
+double Planner::steppedFrom(double u) {
+  const int least = (settings_.levels + 3) / 4;
+  const int most = settings_.levels - least;
+  const int by = least + static_cast<int>(random_.next() * (most - least + 1));
+  const double next = u + static_cast<double>(by) / settings_.levels;
+  return insideCube(next < 1.0 ? next : next - 1.0);
+}
+
 std::vector<Planner::Chain> Planner::drawChains() {
   const std::size_t p = size();
   const auto r = static_cast<std::size_t>(settings_.trajectories);
@@ -220,7 +228,10 @@ std::vector<Planner::Chain> Planner::drawChains() {
   const UnitPoints starts = latinHypercube(r, p, random_);
   for (std::size_t t = 0; t < r; ++t) {
     Chain& chain = chains[t];
-    for (const double u : starts[t]) chain.level.push_back(static_cast<std::uint8_t>(u * settings_.levels));
+    for (const double u : starts[t]) {
+      chain.from.push_back(insideCube(u));
+      chain.to.push_back(steppedFrom(u));
+    }
     chain.order.resize(p);
     std::iota(chain.order.begin(), chain.order.end(), std::uint32_t{0});
     for (std::size_t left = p; left > 1; --left) {
@@ -232,8 +243,7 @@ std::vector<Planner::Chain> Planner::drawChains() {
     for (std::size_t k = 0; k < p; ++k) {
       const std::uint32_t j = chain.order[k];
       const double share = static_cast<double>(k + 1) / static_cast<double>(p + 1);
-      const int level = chain.level[j];
-      chain.centroid[j] = static_cast<float>(share * ofLevel(level) + (1.0 - share) * ofLevel(stepped(level)));
+      chain.centroid[j] = static_cast<float>(share * chain.from[j] + (1.0 - share) * chain.to[j]);
     }
   }
   return chains;
@@ -259,10 +269,8 @@ double Planner::spreadOf(std::span<const Chain> chains, double enough) {
 void Planner::follow(const Chain& chain) {
   const std::size_t p = size();
   EffectTrajectory& trajectory = plan_.trajectories.emplace_back();
-  for (const std::uint8_t level : chain.level) {
-    trajectory.base.push_back(ofLevel(level));
-    trajectory.moved.push_back(ofLevel(stepped(level)));
-  }
+  trajectory.base = chain.from;
+  trajectory.moved = chain.to;
   trajectory.order.assign(chain.order.begin(), chain.order.end());
   trajectory.width.assign(p, 0.0);
   trajectory.evaluations.assign(p + 1, 0);
@@ -271,6 +279,11 @@ void Planner::follow(const Chain& chain) {
   for (std::size_t k = 0; k < p; ++k) {
     const std::size_t j = trajectory.order[k];
     trajectory.width[j] = widthOf(j, point, trajectory.moved[j]);
+    if (trajectory.width[j] == 0.0) {
+      // Half of the range takes an integer parameter to another value, if it has two of the same probability.
+      trajectory.moved[j] = point[j] < 0.5 ? point[j] + 0.5 : point[j] - 0.5;
+      trajectory.width[j] = widthOf(j, point, trajectory.moved[j]);
+    }
     if (trajectory.width[j] == 0.0) {
       ++plan_.unchanged[j];
       continue;

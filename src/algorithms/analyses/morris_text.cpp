@@ -17,6 +17,7 @@ constexpr std::size_t kMostNamed = 20;   // in a sentence
 constexpr int kFewTrajectories = 10;     // with fewer the limits are too narrow or of no use
 constexpr double kMostFurther = 100.0;   // times the trajectories: more are not worth naming
 constexpr double kStable = 0.95;
+constexpr double kTail = 0.05;
 
 std::string percent(double share) {
   const double value = 100.0 * share;
@@ -97,9 +98,23 @@ void Texts::appendVerdicts(const ScreenedOutput& output, std::span<const std::si
   lines.push_back(fixed == 0
                       ? fmt::format("   Can be fixed: none is known to have less than {} of the largest mu*", limit)
                       : fmt::format("   Can be fixed, with less than {} of the largest mu*: {}", limit, fixable));
-  if (fixed > 1) {
-    lines.push_back(fmt::format("      all {} together: sure to {}", fixed,
+  std::size_t inert = 0;
+  std::size_t fewest = std::numeric_limits<std::size_t>::max();
+  for (const ParameterEffects& p : output.effects.parameters) {
+    if (p.verdict != ScreeningVerdict::fix || p.muStar.value != 0.0) continue;
+    ++inert;
+    fewest = std::min(fewest, p.count);
+  }
+  if (fixed - inert > 1) {
+    lines.push_back(fmt::format("      all {}{} together: sure to {}", fixed - inert,
+                                inert > 0 ? " that have an effect" : "",
                                 surenessText(output.effects.fixedTogether, settings.bootstrapSamples)));
+  }
+  if (inert > 0) {
+    lines.push_back(
+        fmt::format("      without any effect in {} or more steps: what acts in less than {} of the space may have "
+                    "gone unseen (95 %)",
+                    fewest, percent(1.0 - std::pow(kTail, 1.0 / static_cast<double>(fewest)))));
   }
   const auto [kept, keepable] = list(ScreeningVerdict::keep, false, [&](std::size_t j) { return names.parameters[j]; });
   if (kept > 0) lines.push_back("   Must be kept: " + keepable);

@@ -33,7 +33,6 @@ class SobolSums {
   }
   void clear() { std::ranges::fill(numbers_, 0.0); }
 
-  double valueCount() const { return numbers_[0]; }
   double mean() const { return numbers_[1] / numbers_[0]; }
   double variance() const { return std::max(0.0, numbers_[2] / numbers_[0] - mean() * mean()); }
   double first(std::size_t factor) const { return meanAt(3 + 2 * factor); }
@@ -190,12 +189,15 @@ std::vector<SobolSums> sumsOfReplicates(const SobolDesign& design, std::span<con
 void takeLimits(const SobolDesign& design, std::span<const SobolSums> replicates,
                 std::span<const std::pair<std::size_t, std::size_t>> pairs, const ReplicateBootstrap& bootstrap,
                 std::size_t samples, std::vector<SobolIndex>& indices) {
-  const auto used = static_cast<std::size_t>(
-      std::ranges::count_if(replicates, [](const SobolSums& sums) { return sums.valueCount() > 0.0; }));
-  if (used < 2) return;
   std::vector<std::vector<double>> drawn(indices.size());
   SobolSums sums = replicates.front();
   std::vector<double> ofSample;
+  // Of how many replicates each index has terms: after failed runs not of all.
+  std::vector<std::size_t> used(indices.size(), 0);
+  for (const SobolSums& replicate : replicates) {
+    indicesOf(replicate, design, pairs, ofSample);
+    for (std::size_t i = 0; i < used.size(); ++i) used[i] += std::isnan(ofSample[i]) ? 0 : 1;
+  }
   for (std::size_t sample = 0; sample < samples; ++sample) {
     sums.clear();
     for (std::size_t r = 0; r < replicates.size(); ++r) {
@@ -207,10 +209,10 @@ void takeLimits(const SobolDesign& design, std::span<const SobolSums> replicates
       if (std::isfinite(ofSample[i])) drawn[i].push_back(ofSample[i]);
     }
   }
-  const double probability = expandedProbability(used);
   for (std::size_t i = 0; i < drawn.size(); ++i) {
+    if (std::isnan(indices[i].value) || used[i] < 2 || drawn[i].empty()) continue;
     std::ranges::sort(drawn[i]);
-    if (std::isnan(indices[i].value)) continue;
+    const double probability = expandedProbability(used[i]);
     indices[i].lower = std::min(indices[i].value, sortedQuantile(drawn[i], probability));
     indices[i].upper = std::max(indices[i].value, sortedQuantile(drawn[i], 1.0 - probability));
   }

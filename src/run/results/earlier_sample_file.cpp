@@ -67,15 +67,33 @@ std::string listOf(std::span<const std::string> lines) {
   return text;
 }
 
-/// What the settings of the earlier run say of its evaluations.
-void compareSettings(const std::string& resultFile, const RunConfig& config, EarlierSample& found) {
-  const std::string path = pathBesideResults(resultFile, run_files::restartFile("_Restart"));
-  const auto then = parseRestartSettings(readFileIfThere(path).value_or(""));
+std::string settingsPathOf(const std::string& resultFile) {
+  return pathBesideResults(resultFile, run_files::restartFile("_Restart"));
+}
+
+/// Of an earlier run, whether its sets are no sample of a distribution, and why.
+std::string notSampled(const RestartSettings& then) {
+  for (const ResultSetting& setting : then.settings) {
+    if (setting.keyword == "Option" && setting.value == "1") {
+      return "sensitivity analysis, which change one parameter or few,";
+    }
+    if (setting.keyword == "Option" && setting.value == "2") return "search, which went where the fit is better,";
+    if (setting.keyword == "Uncertainty_Type" && setting.value.find("DREAM") != std::string::npos) {
+      return "DREAM run, the proposals of its chains with those that were rejected (the posterior is in its "
+             "_Chains.dat),";
+    }
+  }
+  return "";
+}
+
+/// What the settings of the earlier run, if they are there, say of its evaluations.
+void compareSettings(const std::string& resultFile, const std::optional<RestartSettings>& then, const RunConfig& config,
+                     EarlierSample& found) {
   if (!then) {
     found.warnings.push_back(
         fmt::format("{} is not there or damaged: whether the evaluations are of the same observations, "
                     "measures and model is not known",
-                    path));
+                    settingsPathOf(resultFile)));
     return;
   }
   const RestartSettings now = restartSettings(config);
@@ -90,19 +108,16 @@ void compareSettings(const std::string& resultFile, const RunConfig& config, Ear
     found.warnings.push_back(
         fmt::format("The evaluations in {} are of other settings of the model:{}", resultFile, listOf(model)));
   }
-  for (const ResultSetting& setting : then->settings) {
-    if (setting.keyword != "Option" || (setting.value != "1" && setting.value != "2")) continue;
+  if (const std::string kind = notSampled(*then); !kind.empty()) {
     found.warnings.push_back(fmt::format(
         "The sets in {} are those of a {} and no sample of a distribution: quantiles and bands say how those sets are "
         "distributed, and not how uncertain the parameters are",
-        resultFile,
-        setting.value == "1" ? "sensitivity analysis, which change one parameter or few,"
-                             : "search, which went where the fit is better,"));
+        resultFile, kind));
   }
 }
 
 ResultRows readRows(const std::string& file, const std::string& text, const RunConfig& config,
-                    const ResultColumns& columns, EarlierSample& found) {
+                    const ResultColumns& columns, bool isSample, EarlierSample& found) {
   ResultRows rows;
   const ResultTable table = readResultTable(text, columns, rows);
   if (!table.hasHeader)
@@ -124,8 +139,9 @@ ResultRows readRows(const std::string& file, const std::string& text, const RunC
         fmt::format("Lines of {} that are cut off or damaged are passed over: {}", file, table.unusableLines));
   }
   rows.putInOrder();
-  // One that has the result of another would give its set twice the weight.
-  rows.keepIf([&](std::size_t i) { return rows.repeats(i).value_or(0) == 0; });
+  // A sample draws a likely set more than once, and its weight is as often counted. A search has a set again where it
+  // has converged, which says nothing of the set.
+  if (!isSample) rows.keepIf([&](std::size_t i) { return rows.repeats(i).value_or(0) == 0; });
   return rows;
 }
 
@@ -175,14 +191,16 @@ EarlierSample readEarlierSample(const std::string& resultFile, const RunConfig& 
   std::string reason;
   auto text = readTextFile(resultFile, reason);
   if (!text) refuse(resultFile, reason);
-  const ResultRows rows = readRows(resultFile, *text, config, resultColumns(config, space), found);
+  const auto then = parseRestartSettings(readFileIfThere(settingsPathOf(resultFile)).value_or(""));
+  const bool isSample = !then || notSampled(*then).empty();
+  const ResultRows rows = readRows(resultFile, *text, config, resultColumns(config, space), isSample, found);
   text.reset();
   addRows(rows, found.sample);
   const auto succeeded = std::ranges::count(found.sample.ok, true);
   if (succeeded == 0) refuse(resultFile, "it has no successful evaluation");
   found.notes.push_back(fmt::format("{} evaluations are taken from {}, {} of them failed", found.sample.size(),
                                     resultFile, std::ssize(found.sample.ok) - succeeded));
-  compareSettings(resultFile, config, found);
+  compareSettings(resultFile, then, config, found);
   openValues(resultFile, rows, config, observed, found);
   return found;
 }

@@ -30,6 +30,7 @@ function statements(screening: Screening): Node[] {
   const order = ranked(screening);
   const of = (verdict: string) => order.filter((parameter) => parameter.verdict === verdict);
   const [fixed, kept, undecided] = [of('fix').reverse(), of('keep'), of('undecided')];
+  const acting = fixed.filter(({ muStar }) => muStar[0] !== 0);
   const limit = percent(screening.negligible);
   if (fixed.length + kept.length + undecided.length === 0) {
     return [paragraph('Which parameters can be fixed is not said: no parameter changes this output, or there are too few effects.')];
@@ -38,7 +39,7 @@ function statements(screening: Screening): Node[] {
     ? make('li', {}, make('strong', {}, 'Can be fixed: '), `none is known to have less than ${limit} of the largest \u03bc*.`)
     : make('li', {}, make('strong', {}, 'Can be fixed: '),
       `${listed(fixed, (p) => `${nameOf(p)} (${p.muStar[0] === 0 ? 'no effect in any trajectory' : `at most ${percent(p.share[2])} of the largest \u03bc*, sure to ${sure(p.certainty)}`})`)}.`
-      + (fixed.length > 1 ? ` All ${count(fixed.length)} together: sure to ${sure(screening.fixedTogether)}.` : ''))];
+      + (acting.length > 1 ? ` All ${count(acting.length)}${acting.length < fixed.length ? ' that have an effect' : ''} together: sure to ${sure(screening.fixedTogether)}.` : ''))];
   if (kept.length > 0) lines.push(make('li', {}, make('strong', {}, 'Must be kept: '), `${listed(kept, nameOf)}.`));
   if (undecided.length > 0) {
     lines.push(make('li', {}, make('strong', {}, 'Undecided: '),
