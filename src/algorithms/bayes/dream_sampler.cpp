@@ -208,8 +208,9 @@ void DreamSampler::proposeSnooker(std::span<const double> state, Candidate& cand
     squares += axis * axis;
     projection += axis * scaled(j, archive_[picked[1]][j] - archive_[picked[2]][j]);
   }
-  if (!(squares > 0.0)) {
-    candidate.logFactor = -kInfinity;  // the state is a member of the archive: there is no line
+  if (!(squares > 0.0) || projection == 0.0) {
+    // The state is a member of the archive, or the two others are equal: the way has no direction or no length.
+    candidate.logFactor = -kInfinity;
     return;
   }
   const double step = gamma * projection / squares;
