@@ -99,6 +99,26 @@ TEST(Dream, ThePosteriorOfALinearModelIsTheOneInClosedForm) {
   EXPECT_NEAR(width, 2.0 * 1.645 * 3.0, 0.8);
 }
 
+TEST(Dream, ThePriorIsTheDensityOfTheScaleOnWhichSetsAreSampled) {
+  const ModelFolder folder;
+  const std::string setup = writeDream(folder, {.maxEvaluations = 60}, "Likelihood = 'normal'\n Error_Deviation = 3.0");
+  folder.editSetup("Lower_Bound = 0.0\n      Upper_Bound = 10.0\n      Transformation_Type = 0",
+                   "Lower_Bound = 1.0\n      Upper_Bound = 9.0\n      Transformation_Type = 1");
+  folder.editSetup("[/DREAM]",
+                   "[/DREAM]\n[PARAMETER_1]\nDistribution = 'truncated normal'\nDistribution_Scale = 'model'\n"
+                   "Mean_Value = 5.0\nStandard_Deviation = 2.0\n[/PARAMETER_1]");
+  const ProgramResult run = runProgram({setup});
+  ASSERT_EQ(run.exitCode, 0) << run.error;
+  const ReadTable table = readDataTable(folder.read("basin_Chains.dat"));
+  for (const auto& row : table.rows) {
+    // Of ln a: the normal density between 1 and 9 times the derivative a; of b, from 0 to 5, uniform.
+    const double a = realCell(row[*table.column("a")]).value();
+    const double density = std::exp(-0.125 * (a - 5.0) * (a - 5.0)) / (2.0 * std::sqrt(2.0 * M_PI)) / std::erf(M_SQRT2);
+    EXPECT_NEAR(realCell(row[*table.column("Log_Prior")]).value(), std::log(density * a / 5.0), 1e-5);
+  }
+  EXPECT_GE(table.rows.size(), 60U);
+}
+
 TEST(Dream, AnInterruptedRunHasThePosteriorOfItsGenerationsAndGoesOnToTheSameBitsInOtherSlots) {
   const ModelFolder folder;
   const std::string dream = "Likelihood = 'AR(1)'\n Error_Deviation = 0.5, 5.0";
