@@ -4,6 +4,7 @@
 #include <array>
 #include <cmath>
 #include <limits>
+#include <numeric>
 #include <utility>
 
 #include "algorithms/bayes/chain_diagnostics.h"
@@ -14,8 +15,8 @@ namespace mirevo {
 namespace {
 
 constexpr double kInfinity = std::numeric_limits<double>::infinity();
-constexpr double kWholeJumpShare = 0.2;             // of jumps with gamma = 1, from one mode to another
-constexpr double kJumpSpread = 0.1;                 // lambda ~ U(-c, c)
+constexpr double kWholeJumpShare = 0.2;             // of jumps with gamma = 1
+constexpr double kJumpSpread = 0.1;                 // lambda ~ U(-c, c), of the other jumps
 constexpr double kJumpNoise = 1e-6;                 // standard deviation of zeta, of the range
 constexpr std::array kAdaptations{0.5, 0.75, 1.0};  // of burn-in
 constexpr std::size_t kFirstCheck = 50;             // generations behind burn-in
@@ -151,10 +152,10 @@ std::vector<std::size_t> DreamSampler::pickArchive(std::size_t count) {
   return picked;
 }
 
-void DreamSampler::proposeParallel(std::span<const double> state, Candidate& candidate) {
+/// The dimensions that a jump changes, by a crossover value drawn with the probabilities found so far.
+std::vector<std::size_t> DreamSampler::pickDimensions(std::size_t& crossover) {
   const double choice = random_.uniform();
   double sum = 0.0;
-  std::size_t& crossover = candidate.crossover;
   for (crossover = 0; crossover + 1 < crossoverProbabilities_.size(); ++crossover) {
     sum += crossoverProbabilities_[crossover];
     if (choice < sum) break;
@@ -165,9 +166,20 @@ void DreamSampler::proposeParallel(std::span<const double> state, Candidate& can
     if (random_.uniform() < share) changed.push_back(j);
   }
   if (changed.empty()) changed.push_back(random_.below(dimension()));
-  const bool isWhole = random_.uniform() < kWholeJumpShare;
-  const std::size_t pairs = isWhole ? 1 : 1 + random_.below(static_cast<std::size_t>(settings_.pairCount));
-  const double gamma = isWhole ? 1.0 : 2.38 / std::sqrt(2.0 * static_cast<double>(pairs * changed.size()));
+  return changed;
+}
+
+void DreamSampler::proposeParallel(std::span<const double> state, Candidate& candidate) {
+  std::vector<std::size_t> changed(dimension());
+  std::iota(changed.begin(), changed.end(), std::size_t{0});
+  std::size_t pairs = 1;
+  double gamma = 1.0;  // from one peak or ridge to another, whose difference all dimensions share
+  if (!(random_.uniform() < kWholeJumpShare)) {
+    changed = pickDimensions(candidate.crossover.emplace());
+    pairs = 1 + random_.below(static_cast<std::size_t>(settings_.pairCount));
+    gamma = (1.0 + random_.uniform(-kJumpSpread, kJumpSpread)) * 2.38 /
+            std::sqrt(2.0 * static_cast<double>(pairs * changed.size()));
+  }
   const std::vector<std::size_t> picked = pickArchive(2 * pairs);
   std::vector<double>& point = candidate.proposal.point;
   point.assign(state.begin(), state.end());
@@ -175,7 +187,7 @@ void DreamSampler::proposeParallel(std::span<const double> state, Candidate& can
     double difference = 0.0;
     for (std::size_t k = 0; k < pairs; ++k) difference += archive_[picked[2 * k]][j] - archive_[picked[2 * k + 1]][j];
     const double noise = kJumpNoise * (problem_.upper[j] - problem_.lower[j]) * random_.normal();
-    point[j] += (1.0 + random_.uniform(-kJumpSpread, kJumpSpread)) * gamma * difference + noise;
+    point[j] += gamma * difference + noise;
     if (settings_.boundary == BoundaryHandling::fold) point[j] = folded(point[j], problem_.lower[j], problem_.upper[j]);
   }
 }
@@ -196,8 +208,9 @@ void DreamSampler::proposeSnooker(std::span<const double> state, Candidate& cand
     squares += axis * axis;
     projection += axis * scaled(j, archive_[picked[1]][j] - archive_[picked[2]][j]);
   }
-  if (!(squares > 0.0)) {
-    candidate.logFactor = -kInfinity;  // the state is a member of the archive: there is no line
+  if (!(squares > 0.0) || projection == 0.0) {
+    // The state is a member of the archive, or the two others are equal: the way has no direction or no length.
+    candidate.logFactor = -kInfinity;
     return;
   }
   const double step = gamma * projection / squares;
@@ -244,9 +257,9 @@ void DreamSampler::decide(std::size_t chain, const Candidate& candidate, const P
   const double after = result.logLikelihood + candidate.logPrior;
   state.accepted =
       isPossible && (before == -kInfinity || std::log(candidate.uniform) < after - before + candidate.logFactor);
-  if (!candidate.isSnooker && !burnIn_) {
-    crossoverUses_[candidate.crossover] += 1.0;
-    if (state.accepted) noteJump(currentPoints_[chain], candidate.proposal.point, candidate.crossover);
+  if (candidate.crossover && !burnIn_) {
+    crossoverUses_[*candidate.crossover] += 1.0;
+    if (state.accepted) noteJump(currentPoints_[chain], candidate.proposal.point, *candidate.crossover);
   }
   if (burnIn_) {
     DreamCounts& counts = candidate.isSnooker ? snooker_ : parallel_;

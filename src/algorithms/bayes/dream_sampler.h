@@ -121,7 +121,9 @@ enum class DreamEnd { none, converged, budget, generations };
 ///   lower quartile of the mean log-densities, too: a chain on its way to another peak is none.
 /// - At the same three times the older half of the archive is forgotten, as far as more than its first size is left;
 ///   behind burn-in nothing is.
-/// - A jump from peak to peak (gamma = 1) is by one pair of archive members.
+/// - The stretch 1 + lambda is one number for all dimensions of a jump: one for each leads off a narrow ridge.
+/// - A jump from peak to peak (gamma = 1) is by one pair of archive members, in all dimensions and without a stretch:
+///   it has to meet the other peak.
 /// - Prior draws that the setup does not allow are drawn again.
 class DreamSampler final {
  public:
@@ -150,14 +152,15 @@ class DreamSampler final {
     double logPrior = 0.0;
     double logFactor = 0.0;  ///< of a snooker update
     bool isSnooker = false;
-    std::size_t crossover = 0;
-    double uniform = 0.0;  ///< with which its acceptance is decided
+    std::optional<std::size_t> crossover;  ///< index of its value; empty where it changes all dimensions anyway
+    double uniform = 0.0;                  ///< with which its acceptance is decided
   };
 
   std::size_t dimension() const { return problem_.lower.size(); }
   std::vector<double> drawAllowed();
   void initialise();
   Candidate propose(std::size_t chain);
+  std::vector<std::size_t> pickDimensions(std::size_t& crossover);
   void proposeParallel(std::span<const double> state, Candidate& candidate);
   void proposeSnooker(std::span<const double> state, Candidate& candidate);
   std::vector<std::size_t> pickArchive(std::size_t count);

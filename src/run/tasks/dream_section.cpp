@@ -1,14 +1,18 @@
 #include "run/tasks/dream_section.h"
 
+#include <algorithm>
 #include <string>
 #include <utility>
 
 #include <fmt/format.h>
 
 #include "common/text.h"
+#include "measures/period_series.h"
 
 namespace mirevo {
 namespace {
+
+constexpr std::string_view kObjectiveKeyword = "Objective_Function";
 
 /// The value of the enumerator with this name, of a coded keyword whose codes are names in the order of the
 /// enumerators.
@@ -71,7 +75,7 @@ std::vector<KeywordRow> dreamRows() {
            .codes = kLikelihoodNames,
            .meaning = "How the errors of the simulated series are distributed. 'objective': the log-likelihood is "
                       "minus an objective function, for models that give their own."}),
-      setting<&DreamSection::objective>({.name = "Objective_Function",
+      setting<&DreamSection::objective>({.name = kObjectiveKeyword,
                                          .defaultValue = "0",
                                          .range = from(0),
                                          .meaning = "With `Likelihood = 'objective'`, the number of the objective "
@@ -200,11 +204,36 @@ const SettingSection<ErrorModelSettings>& errorModelSection() {
   return section;
 }
 
-void readDreamSection(const SetupSection& section, DreamSection& settings) {
+std::vector<std::size_t> measuresOfLikelihood(std::span<const OutputMeasure> measures,
+                                              std::span<const ObjectiveFunction> objectives) {
+  std::vector<std::size_t> found;
+  for (std::size_t m = 0; m < measures.size(); ++m) {
+    if (measures[m].interfaceType != InterfaceType::timeSeries) continue;
+    const bool isCounted = std::ranges::any_of(objectives, [m](const ObjectiveFunction& objective) {
+      return std::ranges::any_of(objective.measures, [m](const MeasureTerm& term) { return term.index == m; });
+    });
+    const auto isSame = [&](std::size_t other) { return isSamePair(measures[m], measures[other]); };
+    if (isCounted && std::ranges::none_of(found, isSame)) found.push_back(m);
+  }
+  return found;
+}
+
+void readDreamSection(const SetupSection& section, std::span<const OutputMeasure> measures,
+                      std::span<const ObjectiveFunction> objectives, DreamSection& settings) {
   constexpr std::size_t kMostMeasures = 10'000;
   const SetupSection dream = section.open("DREAM");
   dream.read(dreamSection(), settings);
   checkTerms(dream, settings.errors);
+  const std::vector<std::size_t> compared = measuresOfLikelihood(measures, objectives);
+  if (settings.errors.form == LikelihoodForm::objective) {
+    if (static_cast<std::size_t>(settings.objective) > objectives.size()) {
+      dream.refuse(kDreamLikelihoodRefusal, kObjectiveKeyword,
+                   fmt::format("expected 0 to {}, found {}", objectives.size(), settings.objective));
+    }
+  } else if (compared.empty()) {
+    dream.refuse(kDreamLikelihoodRefusal, kLikelihoodKeyword,
+                 "no objective function compares time series: expected 'objective'");
+  }
   for (std::size_t n = 1; n <= kMostMeasures; ++n) {
     if (!dream.has(fmt::format("{}{}", kErrorModelPrefix, n))) continue;
     const SetupSection own = dream.openItem(kErrorModelPrefix, n);
@@ -213,6 +242,9 @@ void readDreamSection(const SetupSection& section, DreamSection& settings) {
     if (settings.own[n].form == LikelihoodForm::objective || settings.errors.form == LikelihoodForm::objective) {
       own.refuse("Error: Error model of DREAM invalid", kLikelihoodKeyword,
                  "expected no error model of an output measure where the likelihood is an objective function");
+    }
+    if (std::ranges::find(compared, n - 1) == compared.end()) {
+      dream.refuse(kDreamLikelihoodRefusal, fmt::format("{}{}", kErrorModelPrefix, n), std::string(kErrorModelMeasure));
     }
   }
 }

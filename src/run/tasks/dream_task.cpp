@@ -7,6 +7,7 @@
 #include "run/tasks/distribution_reading.h"
 #include "run/tasks/posterior_bands.h"
 #include "run/tasks/sample_bands.h"
+#include "run/tasks/simulated_room.h"
 
 namespace mirevo {
 namespace {
@@ -44,7 +45,7 @@ void DreamTask::read(const TaskReading& reading) {
                                "density, as chains move in small steps",
                                *discrete + 1));
   }
-  readDreamSection(section, dream);
+  readDreamSection(section, reading.measures, reading.objectives, dream);
   dream.sampler.mostRuns = settings.sampleSize;
   constexpr std::int32_t kLeastGenerations = 10;
   if (settings.sampleSize < kLeastGenerations * dream.sampler.chainCount) {
@@ -101,6 +102,8 @@ TaskOutcome DreamTask::run(const TaskContext& context) {
   target_ = std::make_unique<DreamTarget>(dream, prior_, context);
   for (const std::string& line : target_->descriptionLines()) context.log.line(line);
   logBandTimes(context, settings);
+  logRoomOfSimulatedValues(context, facts().resultFiles.simulatedValues, static_cast<std::size_t>(settings.sampleSize),
+                           keptPrecision());
   sampler_ = std::make_unique<DreamSampler>(dream.sampler, target_->problem(context), randomSeed);
   bool wasBurningIn = true;
   std::size_t checks = 0;

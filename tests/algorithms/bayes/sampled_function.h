@@ -7,6 +7,8 @@
 #include <utility>
 #include <vector>
 
+#include <gtest/gtest.h>
+
 #include "algorithms/bayes/dream_sampler.h"
 
 namespace mirevo {
@@ -33,6 +35,14 @@ inline DreamProblem sampledFunction(std::vector<double> lower, std::vector<doubl
   problem.lower = std::move(lower);
   problem.upper = std::move(upper);
   return problem;
+}
+
+/// To the end of the budget, whatever the chains' agreement.
+inline DreamSettings untilBudget(int runs) {
+  DreamSettings settings;
+  settings.mostRuns = runs;
+  settings.effectiveSize = 1e9;
+  return settings;
 }
 
 /// The chains at the end of their run.
@@ -64,6 +74,17 @@ inline Moments momentsOf(std::span<const double> values) {
   }
   moments.deviation = std::sqrt(moments.deviation);
   return moments;
+}
+
+/// Mean and standard deviation behind burn-in, within four standard errors by the effective sample size. The
+/// kurtosis is at least that of the target: the standard error of a deviation grows with it.
+inline void expectMoments(const DreamSampler& sampler, std::size_t dimension, double mean, double deviation,
+                          double kurtosis = 5.0) {
+  const double size = sampler.checkNow()->effectiveSizes[dimension];
+  const Moments found = momentsOf(posteriorOf(sampler, dimension));
+  EXPECT_GT(size, 50.0) << dimension;
+  EXPECT_NEAR(found.mean, mean, 4.0 * deviation / std::sqrt(size)) << dimension;
+  EXPECT_NEAR(found.deviation, deviation, 4.0 * deviation * std::sqrt((kurtosis - 1.0) / (4.0 * size))) << dimension;
 }
 
 }  // namespace mirevo
