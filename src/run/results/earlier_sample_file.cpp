@@ -90,15 +90,24 @@ void compareSettings(const std::string& resultFile, const RunConfig& config, Ear
     found.warnings.push_back(
         fmt::format("The evaluations in {} are of other settings of the model:{}", resultFile, listOf(model)));
   }
-  for (const ResultSetting& setting : then->settings) {
-    if (setting.keyword != "Option" || (setting.value != "1" && setting.value != "2")) continue;
-    found.warnings.push_back(fmt::format(
-        "The sets in {} are those of a {} and no sample of a distribution: quantiles and bands say how those sets are "
-        "distributed, and not how uncertain the parameters are",
-        resultFile,
-        setting.value == "1" ? "sensitivity analysis, which change one parameter or few,"
-                             : "search, which went where the fit is better,"));
-  }
+  const auto has = [&](std::string_view keyword, std::string_view value) {
+    return std::ranges::any_of(then->settings, [&](const ResultSetting& setting) {
+      return setting.keyword == keyword && setting.value == value;
+    });
+  };
+  found.areCorrelated = std::ranges::any_of(then->settings, [](const ResultSetting& setting) {
+    return setting.section.ends_with("CORRELATIONS") || setting.section.find("CORRELATIONS/") != std::string::npos;
+  });
+  const char* const origin = has("Option", "1")   ? "sensitivity analysis, which change one parameter or few,"
+                             : has("Option", "2") ? "search, which went where the fit is better,"
+                             : has("Uncertainty_Type", "'DREAM'") ? "run of Markov chains, rejected ones among them,"
+                                                                  : nullptr;
+  if (origin == nullptr) return;
+  found.isOfDistributions = false;
+  found.warnings.push_back(fmt::format(
+      "The sets in {} are those of a {} and no sample of a distribution: quantiles and bands say how those sets are "
+      "distributed, and not how uncertain the parameters are",
+      resultFile, origin));
 }
 
 ResultRows readRows(const std::string& file, const std::string& text, const RunConfig& config,
