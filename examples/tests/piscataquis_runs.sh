@@ -47,6 +47,14 @@ test "$(wc -l <"$folder/uncertainty_Band_1.csv")" -eq 3289
 test "$(wc -l <"$folder/glue_Band_1.csv")" -eq 7034
 grep -q '^# Band of NSE in 1991 to 2000 (validation): [1-9][0-9.]* % of 3653 observations lie ' "$folder/glue.dat"
 
+# A few generations of the chains: the bands reach over the same years, and the errors make the total one the wider.
+sed 's/Sample_Size      = 20000/Sample_Size      = 80/' "$3/dream.kdx" >"$folder/dream.kdx"
+VOLK_PROGRESS=NONE "$1" "$folder/dream.kdx" || { cat "$folder/dream.log"; exit 1; }
+test "$(grep -c '^phi of Discharge RMSE	' "$folder/dream_Posterior.dat")" -eq 1
+share() { sed -n "s/^Band of $1 uncertainty of Discharge RMSE in 1991 to 2000 (validation): \([0-9.]*\) % of 3653 .*/\1/p" "$folder/dream.log"; }
+awk -v parameters="$(share parameter)" -v all="$(share total)" 'BEGIN { exit !(parameters != "" && parameters + 0 < all + 0) }'
+test "$(wc -l <"$folder/dream_TotalBand_1.csv")" -eq 7034
+
 # A few blocks of the Sobol' analysis: 256 model runs.
 sed 's/Sample_Size    = .*/Sample_Size    = 32/' "$3/sobol.kdx" >"$folder/sobol.kdx"
 VOLK_PROGRESS=NONE "$1" "$folder/sobol.kdx" || { cat "$folder/sobol.log"; exit 1; }

@@ -484,7 +484,7 @@ void ReportBuilder::addAnalyses() {
     if (!fault.empty()) note(fmt::format("The weights of GLUE are not shown: {}.", fault));
   }
   if (task.distributions != nullptr) data_.distributions = reportedDistributions(*task.distributions, space());
-  if (task.distributions != nullptr && hasAnalysis) {
+  if ((task.distributions != nullptr || task.isGlue) && hasAnalysis) {
     std::string fault;
     data_.sampleSensitivity = reportedSampleSensitivity(filePrefix_, space().names, fault);
     if (!fault.empty()) note(fault + ".");

@@ -13,6 +13,13 @@ stopifnot(
   is.numeric(as.matrix(drawn)), rownames(covariance) == c("delay", "loss"),
   screening$MuStarLower <= screening$MuStarUpper, screening$Effects == 30, is.numeric(screening$Certainty),
   limits$Lower95 < limits$Upper95, nrow(jacobian) == 730, is.numeric(jacobian$delay),
+  nrow(shares) > 8, shares$Lower <= shares$Upper, is.numeric(shares$Index), growing$Rows == 32,
+  nrow(over_time) == 730, is.numeric(over_time[["ST delay"]]), fixed %in% c("delay", "loss"),
+  sum(weights$Behavioural) == 30, abs(sum(weights$Weight) - 1) < 1e-12,
+  min(weights$loss) < acceptable, acceptable < max(weights$loss),
+  nrow(states) > 0, nrow(states) < nrow(chains), is.numeric(chains$Log_Likelihood),
+  abs(posterior["loss", "Mean"] - mean(states$loss)) < 1e-9, setequal(marginals$Name, rownames(posterior)), setequal(mixing$Name, rownames(posterior)),
+  nrow(total) == 730, held > 0, held < 1,
   quantiles[["5 %"]] <= quantiles[["95 %"]],
   nrow(failures) > 0, failures$Kind == "exitCode", failures$Output == "too dry \\x23 again\\n",
   pairs$Pairs[1] == 730, nrow(checksums) == 301, nchar(checksums$Checksum) == 16)

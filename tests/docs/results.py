@@ -25,6 +25,19 @@ assert str(band.index.dtype) == "datetime64[ns]" and (band["5 %"] <= band["95 %"
 assert set(sensitivity.Kind) == {"measure", "objective", "observations"} and sensitivity.Composite.dtype == float
 assert set(screening.Parameter) == {"delay", "loss"} and (screening.MuStarLower <= screening.MuStarUpper).all()
 assert screening.MuStar.dtype == float and (screening.Certainty <= 1).all() and list(screening.Effects) == [30] * 4
+assert set(shares.Order) >= {"first", "total"} and (shares.Lower <= shares.Upper).all() and shares.Index.dtype == float
+assert set(shares.Parameter.dropna()) == {"delay", "loss"} and list(fixed) == [
+    row[2] for row in lines_of("sobol_Sobol.dat") if row[0] == "objective" and row[4] == "total" and float(row[7]) < 0.05]
+assert set(growing.Rows) == {32} and growing.Index.dtype == float
+assert len(over_time) == 730 and str(over_time.index.dtype) == "datetime64[ns]" and over_time["ST delay"].dtype == float
+assert len(weights) == 100 and weights.Behavioural.sum() == 30 and abs(weights.Weight.sum() - 1) < 1e-12
+glue = pandas.read_csv("glue_Quantiles.dat", sep="\t", comment="#").query("Kind == 'parameter'").set_index("Name")
+assert abs(acceptable - glue.Mean["loss"]) < 1e-9
+assert 0 < len(states) < len(chains) and set(chains.Chain) == {1, 2, 3, 4} and (chains.dtypes[4:] != object).all() and {"delay", "loss"} < set(chains)
+assert abs(posterior.Mean["loss"] - states.loss.mean()) < 1e-9 and posterior["R-hat"].dtype == float
+assert set(marginals.Name) == set(mixing.Name) == set(posterior.index) and mixing["R-hat"].dtype == float
+assert (abs(marginals.groupby("Name").Posterior.sum() - 1) < 1e-9).all()
+assert len(total) == 730 and (total["5 %"] <= total["95 %"]).all() and 0 < held < 1
 for matrix in (covariance, correlation, drawn):
     assert list(matrix.index) == list(matrix.columns) == ["delay", "loss"] and (matrix.dtypes == float).all()
 assert abs(covariance.loc["delay", "loss"] - covariance.loc["loss", "delay"]) < 1e-15

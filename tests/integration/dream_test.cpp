@@ -145,6 +145,39 @@ TEST(Dream, AnInterruptedRunHasThePosteriorOfItsGenerationsAndGoesOnToTheSameBit
   EXPECT_EQ(other.read("basin_TotalBand_1.csv"), bands);
 }
 
+TEST(Dream, ItsBandsReachIntoAValidationPeriodThatBearsOnNoLikelihood) {
+  const ModelFolder folder;
+  std::string observed = folder.read("observed.csv");
+  const std::string dream = "Likelihood = 'normal'\n Error_Deviation = 3.0";
+  const auto write = [&] {
+    const std::string setup = writeDream(folder, {.maxEvaluations = 200}, dream);
+    folder.editSetup("End_Date = 2001-12-31",
+                     "End_Date = 2001-09-30\n    [VALIDATION_PERIODS]\n      TqSEKdxListItemCount = 1\n"
+                     "      [VALIDATION_1]\n        Name = 'autumn'\n        Start_Date = 2001-10-01\n"
+                     "        End_Date = 2001-12-31\n      [/VALIDATION_1]\n    [/VALIDATION_PERIODS]");
+    folder.editSetup("Uncertainty_Type = 'DREAM'",
+                     "Uncertainty_Type = 'DREAM'\n Band_Times = 'steps'\n Band_End_Date = 2001-12-31");
+    return setup;
+  };
+  ASSERT_EQ(runProgram({write()}).exitCode, 0) << folder.read("basin.log");
+  const std::string chains = folder.read("basin_Chains.dat");
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("\nLikelihood of 273 observations\n"));
+  EXPECT_THAT(folder.read("basin.log"),
+              HasSubstr("\nBand of total uncertainty of flow in autumn (validation): 100.0 % of 92 observations lie"));
+  // A flood in autumn: the posterior is the same, and the band does not hold it.
+  for (int day = 1; day <= 23; ++day) {
+    const auto at = observed.find(fmt::format("2001-11-{:02}", day));
+    ASSERT_NE(at, std::string::npos);
+    const auto comma = observed.find(',', at);
+    observed.replace(comma + 1, observed.find('\n', comma) - comma - 1, "1000");
+  }
+  folder.write("observed.csv", observed);
+  ASSERT_EQ(runProgram({write()}).exitCode, 0) << folder.read("basin.log");
+  EXPECT_EQ(readDataTable(folder.read("basin_Chains.dat")).rows, readDataTable(chains).rows);
+  EXPECT_THAT(folder.read("basin.log"),
+              HasSubstr("\nBand of total uncertainty of flow in autumn (validation): 75.0 % of 92 observations lie"));
+}
+
 TEST(Dream, AnObjectiveFunctionMayBeTheLikelihoodAndFailedRunsHaveNone) {
   const ModelFolder folder;
   // The root mean square error is 2.7 at most: its own posterior is wide.

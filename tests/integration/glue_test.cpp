@@ -37,7 +37,8 @@ struct GlueFolder : ModelFolder {
     return rows;
   }
   std::string found() const {
-    return table("basin_Glue.dat") + table("basin_Quantiles.dat") + table("basin_Band_1.csv");
+    return table("basin_Glue.dat") + table("basin_Quantiles.dat") + table("basin_SampleSensitivities.dat") +
+           table("basin_Band_1.csv");
   }
   double quantile(const std::string& kind, const std::string& name, const std::string& heading) const {
     const ReadTable quantiles = readDataTable(read("basin_Quantiles.dat"));
@@ -68,6 +69,16 @@ TEST(Glue, HasTheQuantilesOfTheClosedFormInParametersAndBands) {
     EXPECT_NEAR(folder.quantile("parameter", "a", "95 %"), 10.0 - one.lower, 0.05);
     EXPECT_EQ(folder.quantile("parameter", "a", "Count"), 100.0);
     EXPECT_NEAR(folder.quantile("drawn", "a", "5 %"), 0.5, 0.02);
+    // All sets, behavioural or not, say of what the error comes: of a alone, falling as much as rising.
+    const ReadTable dependence = readDataTable(folder.read("basin_SampleSensitivities.dat"));
+    ASSERT_EQ(dependence.rows.size(), 2U);
+    for (const std::vector<std::string>& row : dependence.rows) {
+      const auto value = [&](const char* heading) { return realCell(row[dependence.column(heading).value()]).value(); };
+      EXPECT_EQ(value("Count"), 240.0);
+      EXPECT_NEAR(value("FirstOrder"), 1.0, 0.02);
+      EXPECT_NEAR(value("RankCorrelation"), 0.0, 0.2);
+    }
+    EXPECT_THAT(folder.read("basin_Report.html"), HasSubstr("\"sampleSensitivity\":{\"parameters\":[\"a\"]"));
     // The model adds the same to all values of a, and at t = 0 nothing.
     const ReadTable band = readDataTable(folder.read("basin_Band_1.csv"));
     EXPECT_THAT(folder.read("basin_Band_1.csv"), HasSubstr("\n2001-01-01 00:00,5,"));
@@ -228,6 +239,7 @@ TEST(Glue, OfASearchSaysThatItsSetsAreNoSampleOfTheParameters) {
   const std::string log = folder.read("basin.log");
   EXPECT_THAT(log, HasSubstr("Warning: The sets in "));
   EXPECT_THAT(log, HasSubstr(" are those of a search, which went where the fit is better, and no sample"));
+  EXPECT_FALSE(folder.exists("basin_SampleSensitivities.dat")) << "they say nothing of the distributions' outputs";
   EXPECT_THAT(log, HasSubstr("Warning: There are no bands: "));
   EXPECT_THAT(log, HasSubstr("\n   Parameter, behavioural "));
 }

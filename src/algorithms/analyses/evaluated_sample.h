@@ -35,6 +35,8 @@ struct EarlierSample {
   SimulatedColumns simulatedColumns = {};  ///< empty: there are none for the observations of this run
   std::vector<std::string> notes = {};     ///< for the log
   std::vector<std::string> warnings = {};
+  bool isOfDistributions = true;  ///< drawn from distributions; not the sets of a search, a design or Markov chains
+  bool areCorrelated = false;     ///< and these were correlated
 };
 
 }  // namespace mirevo

@@ -233,17 +233,16 @@ void addFirstOrder(const std::vector<Order>& orders, const Columns& outputs, std
 }
 
 /// Outputs that have values in the same rows.
-void addDependences(const std::vector<std::vector<double>>& modelValues, const std::vector<std::size_t>& rows,
-                    const Columns& outputs, std::int32_t seed, std::span<OutputDependence*> found) {
-  const std::size_t p = found.front()->parameters.size();
+void addDependences(const Columns& parameters, const std::vector<std::size_t>& rows, const Columns& outputs,
+                    std::int32_t seed, std::span<OutputDependence*> found) {
   Columns outputRanks;
   outputRanks.reserve(outputs.size());
   for (const std::vector<double>& output : outputs) outputRanks.push_back(ranksOf(orderOf(output)));
   std::vector<Order> orders;
-  for (std::size_t j = 0; j < p; ++j) {
+  for (std::size_t j = 0; j < parameters.size(); ++j) {
     std::vector<double> values;
     values.reserve(rows.size());
-    for (const std::size_t row : rows) values.push_back(modelValues[row][j]);
+    for (const std::size_t row : rows) values.push_back(parameters[j][row]);
     const Order& order = orders.emplace_back(orderOf(values));
     const std::vector<double> ranks = ranksOf(order);
     for (std::size_t q = 0; q < found.size(); ++q) {
@@ -297,17 +296,15 @@ void appendJudgement(const OutputDependence& output, const AnalysisNames& names,
 
 }  // namespace
 
-SampleSensitivity sampleSensitivity(const UncertaintyOutcome& outcome, const SearchSpace& space,
-                                    const AnalysisNames& names, std::int32_t seed) {
+SampleSensitivity sampleSensitivity(const EvaluatedSample& sample, const AnalysisNames& names, std::int32_t seed) {
   SampleSensitivity sensitivity;
-  std::vector<std::vector<double>> modelValues;
-  for (const ParameterSet& set : outcome.sample) modelValues.push_back(ToModelScale(space, set));
-  for (const EvaluationResult& result : outcome.results) sensitivity.failedCount += result.ok() ? 0 : 1;
+  sensitivity.failedCount = static_cast<std::size_t>(std::ranges::count(sample.ok, false));
+  const std::size_t parameterCount = sample.size() == 0 ? names.parameters.size() : sample.parameters.size();
   const std::size_t measureCount = names.measures.size();
-  const auto valueOf = [&](const EvaluationResult& result, std::size_t q) {
-    const std::vector<double>& values = q < measureCount ? result.measureValues : result.objectiveValues;
+  const auto columnOf = [&](std::size_t q) -> const std::vector<double>* {
+    const Columns& columns = q < measureCount ? sample.measures : sample.objectives;
     const std::size_t place = q < measureCount ? q : q - measureCount;
-    return result.ok() && place < values.size() ? values[place] : kNaN;
+    return place < columns.size() ? &columns[place] : nullptr;
   };
   std::map<std::vector<std::size_t>, std::vector<std::size_t>> outputsByRows;
   for (std::size_t q = 0; q < measureCount + names.objectives.size(); ++q) {
@@ -315,10 +312,11 @@ SampleSensitivity sampleSensitivity(const UncertaintyOutcome& outcome, const Sea
     OutputDependence& output = sensitivity.outputs.emplace_back();
     output.kind = isMeasure ? "measure" : "objective";
     output.name = isMeasure ? names.measures[q] : names.objectives[q - measureCount];
-    output.parameters.assign(space.size(), {kNaN, kNaN, kNaN, kNaN});
+    output.parameters.assign(parameterCount, {kNaN, kNaN, kNaN, kNaN});
     std::vector<std::size_t> rows;
-    for (std::size_t i = 0; i < outcome.results.size(); ++i) {
-      if (std::isfinite(valueOf(outcome.results[i], q))) rows.push_back(i);
+    const std::vector<double>* const values = columnOf(q);
+    for (std::size_t i = 0; values != nullptr && i < sample.size(); ++i) {
+      if (sample.ok[i] && std::isfinite((*values)[i])) rows.push_back(i);
     }
     output.count = rows.size();
     if (rows.size() >= 2) outputsByRows[std::move(rows)].push_back(q);
@@ -328,12 +326,21 @@ SampleSensitivity sampleSensitivity(const UncertaintyOutcome& outcome, const Sea
     std::vector<OutputDependence*> found;
     for (const std::size_t q : outputs) {
       std::vector<double>& column = columns.emplace_back();
-      for (const std::size_t row : rows) column.push_back(valueOf(outcome.results[row], q));
+      for (const std::size_t row : rows) column.push_back((*columnOf(q))[row]);
       found.push_back(&sensitivity.outputs[q]);
     }
-    addDependences(modelValues, rows, columns, seed, found);
+    addDependences(sample.parameters, rows, columns, seed, found);
   }
   return sensitivity;
+}
+
+SampleSensitivity sampleSensitivity(const UncertaintyOutcome& outcome, const SearchSpace& space,
+                                    const AnalysisNames& names, std::int32_t seed) {
+  EvaluatedSample sample;
+  for (std::size_t i = 0; i < outcome.results.size(); ++i) {
+    sample.add(ToModelScale(space, outcome.sample[i]), outcome.results[i]);
+  }
+  return sampleSensitivity(sample, names, seed);
 }
 
 DataTable sampleSensitivityTable(const SampleSensitivity& sensitivity, const AnalysisNames& names, bool areCorrelated) {

@@ -7,6 +7,7 @@
 #include <string_view>
 #include <vector>
 
+#include "algorithms/analyses/evaluated_sample.h"
 #include "algorithms/analyses/uncertainty.h"
 #include "common/data_table.h"
 #include "parameters/search_space.h"
@@ -45,6 +46,7 @@ inline constexpr std::size_t kLeastForIndices = 100;
 /// 2013, doi:10.1016/j.ejor.2012.11.047). Differing from these, the bias is taken off as from Kelley's epsilon squared
 /// (1935, doi:10.1073/pnas.21.9.554), the share that as many freedoms explain of noise. The limits are normal, with the
 /// standard deviation of 200 bootstrap samples, or of fewer where 10^10 operations would not do. `seed`: of the run.
+SampleSensitivity sampleSensitivity(const EvaluatedSample& sample, const AnalysisNames& names, std::int32_t seed);
 SampleSensitivity sampleSensitivity(const UncertaintyOutcome& outcome, const SearchSpace& space,
                                     const AnalysisNames& names, std::int32_t seed);
 

@@ -108,7 +108,11 @@ void compareSettings(const std::string& resultFile, const std::optional<RestartS
     found.warnings.push_back(
         fmt::format("The evaluations in {} are of other settings of the model:{}", resultFile, listOf(model)));
   }
+  found.areCorrelated = std::ranges::any_of(then->settings, [](const ResultSetting& setting) {
+    return setting.section.ends_with("CORRELATIONS") || setting.section.find("CORRELATIONS/") != std::string::npos;
+  });
   if (const std::string kind = notSampled(*then); !kind.empty()) {
+    found.isOfDistributions = false;
     found.warnings.push_back(fmt::format(
         "The sets in {} are those of a {} and no sample of a distribution: quantiles and bands say how those sets are "
         "distributed, and not how uncertain the parameters are",

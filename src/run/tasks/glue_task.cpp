@@ -8,6 +8,7 @@
 
 #include <fmt/format.h>
 
+#include "algorithms/analyses/sample_sensitivity.h"
 #include "algorithms/analyses/sampled_distributions.h"
 #include "algorithms/numbers/latin_hypercube.h"
 #include "algorithms/numbers/sobol.h"
@@ -176,6 +177,10 @@ void GlueTask::requireSets(const SearchSpace& /*space*/, const Feasibility& feas
   if (!isOfEarlierRun() && settings.redrawsInfeasible && feasibility.isTested()) drawSample(feasibility);
 }
 
+EarlierSample GlueTask::emptySample(const TaskContext& context) const {
+  return {.simulatedColumns = context.simulatedColumns, .areCorrelated = settings.distributions.copula().has_value()};
+}
+
 EarlierSample GlueTask::evaluateSample(const TaskContext& context) const {
   const FeasibleSample drawn = drawSample(context.feasibility);
   if (drawn.drawnCount > std::ssize(drawn.sets)) {
@@ -189,11 +194,22 @@ EarlierSample GlueTask::evaluateSample(const TaskContext& context) const {
   logBandTimes(context, settings);
   logRoomOfSimulatedValues(context, run_files::kPlain.simulatedValues, static_cast<std::size_t>(settings.sampleSize));
   const std::vector<EvaluationResult> results = context.evaluator.evaluateParameterSets(drawn.sets, DispatchMode::task);
-  EarlierSample evaluated{.simulatedColumns = context.simulatedColumns};
+  EarlierSample evaluated = emptySample(context);
   for (std::size_t i = 0; i < results.size(); ++i) {
     evaluated.sample.add(ToModelScale(context.space, drawn.sets[i]), results[i]);
   }
   return evaluated;
+}
+
+/// What all sets say of the outputs, whether they are behavioural or not.
+void GlueTask::addSensitivity(const TaskContext& context, const EarlierSample& evaluated, TaskOutcome& outcome) const {
+  const AnalysisNames names = analysisNames(context);
+  const SampleSensitivity sensitivity = sampleSensitivity(evaluated.sample, names, randomSeed);
+  outcome.tables.push_back(sampleSensitivityTable(sensitivity, names, evaluated.areCorrelated));
+  const std::vector<std::string> lines = formatSampleSensitivity(
+      sensitivity, names, fileNameOf(runFilePath(context.filePrefix, run_files::kSampleSensitivities)),
+      evaluated.areCorrelated);
+  outcome.report.insert(outcome.report.end(), lines.begin(), lines.end());
 }
 
 GlueTask::Found GlueTask::find(const TaskContext& context, const EarlierSample& evaluated) const {
@@ -206,6 +222,7 @@ GlueTask::Found GlueTask::find(const TaskContext& context, const EarlierSample& 
   outcome.report = formatGlue(sample, weights, summary, judge_, glue, names,
                               fileNameOf(runFilePath(context.filePrefix, run_files::kSampleCorrelation)));
   outcome.tables = glueTables(sample, weights, summary, judge_, glue, names);
+  if (evaluated.isOfDistributions) addSensitivity(context, evaluated, outcome);
   if (!evaluated.simulatedColumns) return found;
   std::vector<int> numbers;
   std::vector<double> ofNumbers;
@@ -242,7 +259,7 @@ TaskOutcome GlueTask::run(const TaskContext& context) {
 
 std::optional<TaskOutcome> GlueTask::unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const {
   if (isOfEarlierRun()) return std::nullopt;
-  EarlierSample evaluated{.simulatedColumns = context.simulatedColumns};
+  EarlierSample evaluated = emptySample(context);
   for (std::size_t i = 0; i < made.results.size(); ++i) {
     evaluated.sample.add(ToModelScale(context.space, made.sets[i]), made.results[i]);
   }

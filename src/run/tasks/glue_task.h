@@ -41,7 +41,9 @@ class GlueTask final : public Task {
   void refuseOwnResults(const TaskReading& reading, const SetupSection& section) const;
   /// The sets and how many were drawn for them; fewer only if none are redrawn.
   FeasibleSample drawSample(const Feasibility& feasibility) const;
+  EarlierSample emptySample(const TaskContext& context) const;
   EarlierSample evaluateSample(const TaskContext& context) const;
+  void addSensitivity(const TaskContext& context, const EarlierSample& evaluated, TaskOutcome& outcome) const;
   struct Found {
     TaskOutcome outcome;
     std::vector<std::string> warnings;  ///< which the report has, too

@@ -49,6 +49,12 @@ BandStates bandStates(const DreamSampler& sampler) {
   return found;
 }
 
+std::string coverageText(const std::string& title, const BandCoverage& coverage) {
+  if (coverage.observationCount == 0) return title + ": no observation has a simulated value";
+  return fmt::format("{}: {:.1f} % of {} observations lie between the 5 and the 95 % quantile, {}", title,
+                     100.0 * coverage.shareInside, coverage.observationCount, bandWidthText(coverage));
+}
+
 class BandReport {
  public:
   BandReport(const TaskContext& context, bool hasSteps, std::vector<TaskFile>& files)
@@ -58,19 +64,26 @@ class BandReport {
     const std::string& name = context_.measures[observed.measure].name;
     files_.push_back({runFilePath(context_.filePrefix, file, static_cast<int>(observed.measure) + 1),
                       seriesBandText(name, observed, band, hasSteps_)});
-    if (band.coverage.observationCount == 0) {
-      lines.push_back(fmt::format("{} of {}: no observation has a simulated value", what, name));
-    } else {
-      lines.push_back(fmt::format("{} of {}: {:.1f} % of {} observations lie between the 5 and the 95 % quantile, {}",
-                                  what, name, 100.0 * band.coverage.shareInside, band.coverage.observationCount,
-                                  bandWidthText(band.coverage)));
-    }
+    const std::string title = fmt::format("{} of {}", what, name);
+    lines.push_back(coverageText(title, band.coverage));
+    addUnused(observed, title, band);
     lines.push_back("   " + files_.back().path);
   }
 
   std::vector<std::string> lines;
 
  private:
+  /// Of the validation periods over which the band reaches.
+  void addUnused(const ObservedSeries& observed, const std::string& title, const SeriesBand& band) {
+    for (const ValidationObservations& validation : context_.validationObservations) {
+      if (validation.observed.measure != observed.measure) continue;
+      const BandCoverage unused = coverageOf(band, observed, validation.observed);
+      if (unused.observationCount == 0) continue;
+      const std::string& period = context_.validationPeriods[validation.period].name;
+      lines.push_back(coverageText(fmt::format("{} in {} (validation)", title, period), unused));
+    }
+  }
+
   const TaskContext& context_;
   bool hasSteps_;
   std::vector<TaskFile>& files_;
