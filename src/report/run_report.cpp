@@ -483,6 +483,11 @@ void ReportBuilder::addAnalyses() {
     data_.glue = reportedGlue(filePrefix_, config_.parameters, fault);
     if (!fault.empty()) note(fmt::format("The weights of GLUE are not shown: {}.", fault));
   }
+  if (task.chains != nullptr && hasAnalysis) {
+    std::vector<std::string> faults;
+    data_.posterior = reportedPosterior(filePrefix_, *task.chains, space().size(), faults);
+    for (const std::string& fault : faults) note(fault + ".");
+  }
   if (task.distributions != nullptr) data_.distributions = reportedDistributions(*task.distributions, space());
   if (task.distributions != nullptr && hasAnalysis) {
     std::string fault;

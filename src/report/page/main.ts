@@ -9,6 +9,7 @@ import { glueSection } from './sections/glue';
 import { historySection } from './sections/histories';
 import { morrisSection } from './sections/morris';
 import { failureSection, head, parameterSection, resultSection, runSection, summarySection } from './sections/overview';
+import { posteriorSection } from './sections/posterior';
 import { dottySection, goodSetsSection, progressSection } from './sections/search';
 import { sampleSection } from './sections/sample';
 import type { Section } from './sections/section';
@@ -24,6 +25,7 @@ function sections(data: ReportData): Section[] {
   const all = [
     bandSection(data),
     glueSection(data),
+    posteriorSection(data),
     sensitivitySection(data),
     morrisSection(data),
     sobolSection(data),
