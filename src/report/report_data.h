@@ -112,8 +112,8 @@ struct ReportedBand {
   std::size_t insideCount = 0;       ///< those inside the band
   double meanWidth = 0.0;            ///< BandCoverage, at the observations; likewise
   double relativeWidth = 0.0;
-  int fewestRuns = 0;  ///< of the times with a band
-  int mostRuns = 0;    ///< where the file does not say it, the runs that succeeded
+  int fewestRuns = 0;    ///< of the times with a band
+  int mostRuns = 0;      ///< where the file does not say it, the runs that succeeded
   bool isTotal = false;  ///< of what would be observed: with the errors
 };
 

@@ -5,6 +5,7 @@
 #include <functional>
 #include <limits>
 #include <map>
+#include <numeric>
 #include <string_view>
 
 #include <fmt/format.h>
@@ -83,8 +84,8 @@ std::optional<ReadTable> readHead(std::string_view text, std::size_t& end) {
   ReadTable head = readDataTable(text.substr(0, end));
   static constexpr std::string_view kNames[] = {"Generation", "Chain",          "Burn_In",  "Evaluation",
                                                 "Accepted",   "Log_Likelihood", "Log_Prior"};
-  const bool isOfChains = head.columns.size() > kFirstDimension &&
-                          std::equal(std::begin(kNames), std::end(kNames), head.columns.begin());
+  const bool isOfChains =
+      head.columns.size() > kFirstDimension && std::equal(std::begin(kNames), std::end(kNames), head.columns.begin());
   if (!isOfChains) return std::nullopt;
   return head;
 }
@@ -131,12 +132,26 @@ void takeAcceptance(const ChainStates& states, ReportedPosterior& posterior) {
       if (states.column(kAccepted)[g * states.chainCount + c] == 1.0) ++ofChain;
     }
     const std::size_t proposals = states.generationCount - posterior.burnIn;
-    posterior.chainAcceptance.push_back(
-        proposals > 0 ? static_cast<double>(ofChain) / static_cast<double>(proposals) : kNaN);
+    posterior.chainAcceptance.push_back(proposals > 0 ? static_cast<double>(ofChain) / static_cast<double>(proposals)
+                                                      : kNaN);
     accepted += ofChain;
   }
   posterior.acceptance =
       posterior.stateCount > 0 ? static_cast<double>(accepted) / static_cast<double>(posterior.stateCount) : kNaN;
+}
+
+/// How much larger the mean log-likelihood of the last third of the generations behind burn-in is than that of the
+/// first; NaN where there are too few, or where one is not finite.
+double riseOf(const ChainStates& states, const ReportedPosterior& posterior) {
+  const std::size_t third = (states.generationCount - posterior.burnIn) / 3;
+  const auto meanFrom = [&](std::size_t generation) {
+    const auto first =
+        states.column(kLogLikelihood).begin() + static_cast<std::ptrdiff_t>(generation * states.chainCount);
+    const std::size_t count = third * states.chainCount;
+    return std::accumulate(first, first + static_cast<std::ptrdiff_t>(count), 0.0) / static_cast<double>(count);
+  };
+  const double rise = third == 0 ? kNaN : meanFrom(states.generationCount - third) - meanFrom(posterior.burnIn);
+  return std::isfinite(rise) ? rise : kNaN;
 }
 
 /// Traces, draws and acceptance.
@@ -149,9 +164,10 @@ void takeStates(const ChainStates& states, ReportedPosterior& posterior) {
   }
   posterior.stateCount = (states.generationCount - posterior.burnIn) * states.chainCount;
   takeAcceptance(states, posterior);
+  posterior.rise = riseOf(states, posterior);
   const std::size_t chains = std::min(states.chainCount, kMostChains);
-  const std::size_t most = std::clamp(kMostTraced / (chains * (posterior.dimensions.size() + 1)), kFewestGenerations,
-                                      kMostGenerations);
+  const std::size_t most =
+      std::clamp(kMostTraced / (chains * (posterior.dimensions.size() + 1)), kFewestGenerations, kMostGenerations);
   const std::size_t step = std::max<std::size_t>(1, (states.generationCount + most - 1) / most);
   std::vector<std::size_t> shown;
   for (std::size_t g = 0; g < states.generationCount; g += step) shown.push_back(g);
@@ -192,8 +208,7 @@ bool takeSummary(const NamedTable& summary, ReportedPosterior& posterior) {
     own.mostProbable = summary.number(j, "Most probable");
     own.rHat = summary.number(j, "R-hat");
     own.effectiveSize = summary.number(j, "Effective size");
-    const double before = own.priorQuantiles.back() - own.priorQuantiles.front();
-    own.narrowing = before > 0.0 ? (own.quantiles.back() - own.quantiles.front()) / before : kNaN;
+    own.narrowing = narrowingOf(own.quantiles, own.priorQuantiles);
   }
   return true;
 }
@@ -272,16 +287,26 @@ std::vector<std::string> adviceOf(const ReportedPosterior& posterior, Convergenc
   if (posterior.isUnfinished) {
     advice.emplace_back("The run was interrupted. Restart = 1 lets the chains go on from here");
   }
-  const auto few = acceptanceWords(posterior.acceptance);
-  if (few) advice.push_back(*few);
+  // The log-likelihood of d dimensions has about the standard deviation sqrt(d / 2) over its posterior.
+  const bool isRising = posterior.rise > static_cast<double>(std::max<std::size_t>(posterior.dimensions.size(), 4));
+  if (isRising) {
+    advice.push_back(fmt::format(
+        "The log-likelihood still rises behind burn-in, by {:.4g} from the first to the last third of the generations: "
+        "the chains have not arrived yet",
+        posterior.rise));
+  }
+  if (const auto few = acceptanceWords(posterior.acceptance)) advice.push_back(*few);
   if (!posterior.hasPosterior || state == Convergence::reached) return advice;
-  for (std::string& line : adviceWords(figuresOf(posterior), posterior.limits, posterior.correlations)) {
-    advice.push_back(std::move(line));
+  // On the way to the posterior, correlations are those of the way.
+  if (!isRising) {
+    for (std::string& line : adviceWords(figuresOf(posterior), posterior.limits, posterior.correlations)) {
+      advice.push_back(std::move(line));
+    }
   }
   if (!posterior.isUnfinished) {
     advice.emplace_back(
-        "A run with a larger Sample_Size begins anew (Restart = 0): burn-in is a share of it. The most probable state "
-        "below is a good initial value, for a likelihood that fits the errors better or for narrower bounds, too");
+        "A run with a larger Sample_Size begins anew (Restart = 0), as burn-in is a share of it. Bounds or priors that "
+        "are narrower around good sets, and a likelihood that fits the errors, shorten the way");
   }
   return advice;
 }

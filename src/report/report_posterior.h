@@ -44,12 +44,13 @@ struct ReportedPosterior {
   std::size_t stateCount = 0;  ///< behind burn-in
   double acceptance = 0.0;     ///< share of the proposals behind burn-in; NaN without any
   std::vector<double> chainAcceptance;
+  double rise = 0.0;                ///< of the mean log-likelihood behind burn-in; NaN if it is not known
   std::vector<double> generations;  ///< that the traces show
   std::vector<std::vector<double>> logLikelihoods;
-  std::vector<double> checkedRuns;                 ///< model runs at which the chains were compared
-  std::vector<std::vector<double>> correlations;   ///< of all dimensions; empty if they are not known
-  bool isUnfinished = false;                       ///< the run was interrupted
-  bool hasPosterior = false;                       ///< else the run ended in burn-in, or its table cannot be read
+  std::vector<double> checkedRuns;                ///< model runs at which the chains were compared
+  std::vector<std::vector<double>> correlations;  ///< of all dimensions; empty if they are not known
+  bool isUnfinished = false;                      ///< the run was interrupted
+  bool hasPosterior = false;                      ///< else the run ended in burn-in, or its table cannot be read
 };
 
 /// What Markov chains have written beside their results; empty if there are no chains. Each file that cannot be read is

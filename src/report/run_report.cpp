@@ -464,7 +464,7 @@ void ReportBuilder::addAnalyses() {
     for (const std::string& fault : faults) note(fault + ".");
     const std::vector<bool>& ok = data_.evaluations.ok;
     for (ReportedBand& band : data_.bands) {
-      if (band.runs.empty())
+      if (band.runs.empty() && task.chains == nullptr)  // those of chains are of their states
         band.mostRuns = analysed.value_or(static_cast<int>(std::count(ok.begin(), ok.end(), true)));
     }
   }

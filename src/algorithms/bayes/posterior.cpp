@@ -67,10 +67,8 @@ std::vector<DimensionFigures> figuresOf(const ShownDimensions& dimensions, const
   std::vector<DimensionFigures> figures;
   for (std::size_t j = 0; j < dimensions.names.size(); ++j) {
     const PosteriorSummary::Dimension& own = summary.dimensions[j];
-    const double before = own.priorQuantiles.back() - own.priorQuantiles.front();
-    const double after = own.quantiles.back() - own.quantiles.front();
-    const double narrowing = before > 0.0 ? after / before : std::numeric_limits<double>::quiet_NaN();
-    figures.push_back({dimensions.names[j], own.rHat, own.effectiveSize, narrowing});
+    figures.push_back(
+        {dimensions.names[j], own.rHat, own.effectiveSize, narrowingOf(own.quantiles, own.priorQuantiles)});
   }
   return figures;
 }
@@ -214,11 +212,12 @@ DataTable posteriorTable(const PosteriorSummary& summary, const ShownDimensions&
 
 DataTable marginalsTable(const DreamSampler& sampler, const ShownDimensions& dimensions,
                          std::span<const std::vector<double>> priorDraws) {
-  DataTable table{run_files::kMarginals,
-                  {"Shares of the posterior and of the prior in bins over the range of the posterior, of equal width or, where it "
-                   "spans more than a factor of ten, of equal ratio"},
-                  {"Name", "From", "To", "Posterior", "Prior"},
-                  {}};
+  DataTable table{
+      run_files::kMarginals,
+      {"Shares of the posterior and of the prior in bins over the range of the posterior, of equal width or, where it "
+       "spans more than a factor of ten, of equal ratio"},
+      {"Name", "From", "To", "Posterior", "Prior"},
+      {}};
   std::vector<std::vector<double>> columns(dimensions.names.size());
   forPosterior(sampler, [&](const ChainHistory::State& state) {
     const std::vector<double> values = dimensions.shown(state.point);

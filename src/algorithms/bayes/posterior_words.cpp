@@ -54,6 +54,18 @@ std::vector<const DimensionFigures*> worstFirst(std::span<const DimensionFigures
 
 }  // namespace
 
+double narrowingOf(std::span<const double> quantiles, std::span<const double> priorQuantiles) {
+  constexpr double kManyfold = 10.0;
+  const auto ratio = [&](const auto& scaled) {
+    const double before = scaled(priorQuantiles.back()) - scaled(priorQuantiles.front());
+    return before > 0.0 ? (scaled(quantiles.back()) - scaled(quantiles.front())) / before
+                        : std::numeric_limits<double>::quiet_NaN();
+  };
+  const bool isWide = priorQuantiles.front() > 0.0 && priorQuantiles.back() > kManyfold * priorQuantiles.front();
+  if (isWide && quantiles.front() > 0.0) return ratio([](double value) { return std::log(value); });
+  return ratio([](double value) { return value; });
+}
+
 ConvergenceWords convergenceWords(std::span<const DimensionFigures> dimensions, const ConvergenceLimits& limits) {
   std::vector<std::pair<std::string, std::string>> apart;
   std::vector<std::pair<std::string, std::string>> few;
@@ -84,9 +96,7 @@ ConvergenceWords convergenceWords(std::span<const DimensionFigures> dimensions, 
         "standard deviation divided by its square root, the 5 and 95 % quantiles less well. Raise Sample_Size",
         apart.empty() ? "chains agree" : "chains agree in the others", limits.effectiveSize, listed(few)));
   }
-  words.state = !apart.empty()  ? Convergence::apart
-                : !few.empty() ? Convergence::fewDraws
-                               : Convergence::reached;
+  words.state = !apart.empty() ? Convergence::apart : !few.empty() ? Convergence::fewDraws : Convergence::reached;
   return words;
 }
 
@@ -102,9 +112,10 @@ std::vector<std::string> tradeOffWords(std::span<const std::string> names,
   std::vector<std::string> lines;
   for (const auto& [i, j] : largestEntries(matrix)) {
     if (std::abs(matrix[i][j]) < kTradeOff) continue;
-    lines.push_back(fmt::format("{} and {} trade off: a correlation of {:.2f}. The data know a combination of them "
-                                "better than either",
-                                names[i], names[j], matrix[i][j]));
+    lines.push_back(
+        fmt::format("{} and {} trade off: a correlation of {:.2f}. The data know a combination of them "
+                    "better than either",
+                    names[i], names[j], matrix[i][j]));
   }
   return lines;
 }
@@ -123,15 +134,17 @@ std::vector<std::string> adviceWords(std::span<const DimensionFigures> dimension
   std::vector<std::string> advice;
   for (const DimensionFigures& one : dimensions) {
     if (!isPoor(one) || !isHardlyNarrower(one)) continue;
-    advice.push_back(fmt::format("{} cannot be told from these data, and the chains wander over all of its prior. Fix "
-                                 "it, or give it a narrower prior",
-                                 one.name));
+    advice.push_back(
+        fmt::format("{} cannot be told from these data, and the chains wander over all of its prior. Fix "
+                    "it, or give it a narrower prior",
+                    one.name));
   }
   for (const auto& [i, j] : largestEntries(matrix)) {
     if (std::abs(matrix[i][j]) < kTradeOff || !isPoor(dimensions[i]) || !isPoor(dimensions[j])) continue;
-    advice.push_back(fmt::format("{} and {} trade off, and chains move slowly along their ridge. Fix one of them, or "
-                                 "calibrate their ratio, product or sum instead of one",
-                                 dimensions[i].name, dimensions[j].name));
+    advice.push_back(
+        fmt::format("{} and {} trade off, and chains move slowly along their ridge. Fix one of them, or "
+                    "calibrate their ratio, product or sum instead of one",
+                    dimensions[i].name, dimensions[j].name));
   }
   return advice;
 }

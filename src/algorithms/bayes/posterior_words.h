@@ -12,8 +12,13 @@ struct DimensionFigures {
   std::string name;
   double rHat = 0.0;
   double effectiveSize = 0.0;
-  double narrowing = 0.0;  ///< the 5 to 95 % range of the posterior as a part of that of the prior, as they are shown
+  double narrowing = 0.0;  ///< narrowingOf() its quantiles
 };
+
+/// The range of the posterior, from its first to its last quantile, as a part of that of the prior; of the logarithms
+/// where the prior spans more than a factor of ten, as its range would otherwise be that of its largest values alone.
+/// NaN where the prior has none.
+double narrowingOf(std::span<const double> quantiles, std::span<const double> priorQuantiles);
 
 /// The limits at which chains count as converged.
 struct ConvergenceLimits {
@@ -40,8 +45,7 @@ ConvergenceWords convergenceWords(std::span<const DimensionFigures> dimensions, 
 std::optional<std::string> acceptanceWords(double rate);
 
 /// A line for each strong correlation, the strongest first. `matrix`: one row and one column per dimension.
-std::vector<std::string> tradeOffWords(std::span<const std::string> names,
-                                       std::span<const std::vector<double>> matrix);
+std::vector<std::string> tradeOffWords(std::span<const std::string> names, std::span<const std::vector<double>> matrix);
 
 /// Whether the data say little of it.
 bool isHardlyNarrower(const DimensionFigures& dimension);

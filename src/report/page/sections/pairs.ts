@@ -12,9 +12,13 @@ const kRoom = { left: 74, right: 10, top: 8, bottom: 50 }; // around the matrix
 const kGap = 6;
 const kLabelRoom = 76; // pixels of a cell, from which its axes have numbers
 
-/** The strongest colour for 1 and -1, none for 0. */
+/** Between the colours from -1 to 1. */
 function colour(diverging: string[], value: number): string {
-  return diverging[Math.round(((value + 1) / 2) * (diverging.length - 1))]!;
+  const place = ((value + 1) / 2) * (diverging.length - 1);
+  const below = Math.min(Math.floor(place), diverging.length - 2);
+  const part = (text: string, at: number) => parseInt(text.slice(1 + 2 * at, 3 + 2 * at), 16);
+  const mixed = [0, 1, 2].map((at) => Math.round(part(diverging[below]!, at) * (below + 1 - place) + part(diverging[below + 1]!, at) * (place - below)));
+  return `rgb(${mixed.join(', ')})`;
 }
 
 function pairPlan(dimensions: PosteriorDimension[], correlations: Maybe[][], chosen: () => number[]): ChartPlan {
@@ -41,11 +45,11 @@ function pairPlan(dimensions: PosteriorDimension[], correlations: Maybe[][], cho
         grids!.push({ left: kRoom.left + column * (across + kGap), top: kRoom.top + row * (down + kGap), width: across, height: down, containLabel: false, show: !plain, borderColor: look.rule });
         const quiet = { splitLine: { show: false }, axisTick: { show: false }, gridIndex: index, splitNumber: 2 };
         const labels = (on: boolean, of: PosteriorDimension) => ({ ...(scale(of) as { axisLabel?: object }).axisLabel, show: on && hasLabels, fontSize: 10, showMinLabel: false, showMaxLabel: false, hideOverlap: true });
-        xAxes!.push(axis(look, column > row ? { ...quiet, show: false, min: 0, max: 1 } : { ...quiet, ...scale(beside.of),
+        xAxes!.push(axis(look, column > row ? { ...quiet, show: false, min: 0, max: 1 } : { ...quiet, ...scale(beside.of), axisTick: { show: false },
           axisLabel: labels(isBottom, beside.of), axisLine: { show: false }, ...(isBottom ? { name: shorten(beside.of.name, Math.max(3, Math.floor(across / 7))), nameGap: hasLabels ? 26 : 10, nameTextStyle: { color: look.ink } } : {}) }));
         yAxes!.push(axis(look, plain ? { ...quiet, scale: false, show: isDiagonal && isLeft, min: 0, axisLabel: { show: false }, axisLine: { show: false },
           ...(isDiagonal && isLeft ? { name: shorten(below.of.name, Math.max(3, Math.floor(down / 7))), nameGap: hasLabels ? 52 : 10, nameTextStyle: { color: look.ink } } : {}), ...(column > row ? { max: 1 } : {}) }
-          : { ...quiet, ...scale(below.of), axisLabel: labels(isLeft, below.of), axisLine: { show: false },
+          : { ...quiet, ...scale(below.of), axisTick: { show: false }, axisLabel: labels(isLeft, below.of), axisLine: { show: false },
             ...(isLeft ? { name: shorten(below.of.name, Math.max(3, Math.floor(down / 7))), nameGap: hasLabels ? 52 : 10, nameTextStyle: { color: look.ink } } : {}) }));
         const own = { xAxisIndex: index, yAxisIndex: index };
         if (column < row) {
@@ -108,5 +112,5 @@ export function pairPlots(all: PosteriorDimension[], matrix: Maybe[][]): HTMLEle
       drawn.redraw();
     },
   }, shorten(name, 24)));
-  return [make('p', { class: 'note' }, `Those with the strongest correlations. Choose others, up to ${kMostPaired} at a time:`), make('div', { class: 'tools' }, ...buttons), drawn];
+  return [make('p', { class: 'note' }, `Those with the strongest correlations. Choose others, up to ${kMostPaired} at a time:`), make('div', { class: 'picks' }, ...buttons), drawn];
 }

@@ -52,16 +52,16 @@ function checkPlan(posterior: Posterior, of: Check, limit: number, title: string
   const log = isRHat && Math.max(...all, 1) > 3;
   return {
     title,
-    note: `${note}${shown.length < known.length ? ` The worst ${count(shown.length)} of ${count(known.length)} are drawn.` : ''}`,
+    note: `${note} Dashed: ${isRHat ? 'at most' : 'at least'} ${number(limit)} is wanted.${shown.length < known.length ? ` The worst ${count(shown.length)} of ${count(known.length)} are drawn.` : ''}`,
     height: 300,
     small: true,
     option: (look) => ({
       legend: legend(look, { data: lineEntries(shown.map(({ name }) => name)), itemWidth: 22, textStyle: { color: look.ink, width: 110, overflow: 'truncate' } }),
       grid: { left: 44, right: 18, top: 36, bottom: 34 },
       xAxis: axis(look, { name: 'model runs', nameGap: 22, integer: true, splitNumber: 4, min: checkedRuns.length > 1 ? 'dataMin' : undefined, max: checkedRuns.length > 1 ? 'dataMax' : undefined }),
-      yAxis: axis(look, { log, scale: isRHat, splitNumber: 4,
-        ...(isRHat ? { min: Math.min(0.99, ...all), max: Math.max(1.02 * limit, ...all.map((value) => 1.02 * value)), axisLabel: { showMinLabel: false, showMaxLabel: false } }
-          : { min: 0, max: Math.ceil(1.1 * Math.max(limit, ...all)) , axisLabel: { showMaxLabel: false } }) }),
+      yAxis: axis(look, { splitNumber: 4, ...(log ? logRange([[1, limit], all])
+        : isRHat ? { min: Math.min(0.99, ...all), max: Math.max(limit, ...all) * 1.01, axisLabel: { showMinLabel: false, showMaxLabel: false } }
+          : { scale: false, max: Math.ceil(1.1 * Math.max(limit, ...all)), axisLabel: { showMaxLabel: false } }) }),
       tooltip: tooltip(look, { trigger: 'axis', formatter: (found: { dataIndex: number }[]) => {
         const place = found[0]!.dataIndex;
         return tip(`${count(checkedRuns[place]!)} model runs`, shown.map((dimension) => [shorten(dimension.name, 40), number(dimension[of][place], isRHat ? 4 : 3)] as [string, string]));
@@ -69,8 +69,7 @@ function checkPlan(posterior: Posterior, of: Check, limit: number, title: string
       series: shown.map((dimension, line) => ({
         name: dimension.name, type: 'line', symbolSize: checkedRuns.length > 40 ? 0 : 5, color: look.many[line % look.many.length], lineStyle: { width: 1.5 },
         data: checkedRuns.map((runs, place) => [runs, dimension[of][place] ?? null]),
-        markLine: line === 0 ? { silent: true, symbol: 'none', lineStyle: { color: look.ink, type: 'dashed', width: 1.5 },
-          label: { show: true, formatter: `${isRHat ? 'at most' : 'at least'} ${number(limit)}`, position: 'insideStartTop', color: look.ink }, data: [{ yAxis: limit }] } : undefined,
+        markLine: line === 0 ? { silent: true, symbol: 'none', label: { show: false }, lineStyle: { color: look.ink, type: 'dashed', width: 1.5 }, data: [{ yAxis: limit }] } : undefined,
       })),
     }),
     values: () => ({
@@ -92,8 +91,8 @@ function narrowed({ narrowing, isHardlyNarrower }: PosteriorDimension): string {
 function knownTable({ dimensions }: Posterior): Node {
   const columns = [{ title: 'Parameter' }, ...['5 %', 'Median', '95 %'].map((title) => ({ title, number: true })),
     { title: 'Prior 5 %', number: true }, { title: 'Prior 95 %', number: true },
-    { title: 'Width', number: true, hint: 'From 5 to 95 %, as a part of that of the prior' }, { title: '' },
-    { title: 'Most probable', number: true, hint: 'The state of the largest posterior density' }, { title: 'R-hat', number: true }, { title: 'Eff. size', number: true, hint: 'Independent draws that would tell as much' }];
+    { title: 'Width', number: true, hint: 'From 5 to 95 %, as a part of that of the prior; of logarithms where the prior spans more than a factor of ten' }, { title: '' },
+    { title: 'Most probable', number: true, hint: 'The state of the largest posterior density' }, { title: 'R\u2011hat', number: true }, { title: 'Eff. size', number: true, hint: 'Independent draws that would tell as much' }];
   const rows = dimensions.map((of) => [of.name, number(of.quantiles[0]), number(of.quantiles[2]), number(of.quantiles[4]), number(of.priorQuantiles[0]), number(of.priorQuantiles[4]),
     percent(of.narrowing, 2), narrowed(of), number(of.mostProbable), number(of.rHat, 3), of.effectiveSize === null ? '' : count(of.effectiveSize)]);
   return table(columns, rows, 'Parameters before and after the observations');
@@ -119,7 +118,7 @@ function marginalPlan(of: PosteriorDimension): ChartPlan {
     height: 220,
     small: true,
     option: (look) => ({
-      legend: legend(look, { data: ['posterior', 'prior', 'most probable'], itemWidth: 18 }),
+      legend: legend(look, { data: ['posterior', ...lineEntries(['prior', 'most probable'])], itemWidth: 22 }),
       grid: { left: 16, right: 18, top: 34, bottom: 16 },
       xAxis: axis(look, { splitNumber: 4, splitLine: { show: false }, axisLabel: { showMinLabel: false, showMaxLabel: false }, ...(of.logarithmic ? logRange([edges]) : {}), min: left, max: right }),
       yAxis: axis(look, { scale: false, splitNumber: 3 }),
@@ -167,7 +166,7 @@ function tracePlan(posterior: Posterior, name: string, traces: Maybe[][], log: b
       ...(isLikelihood ? { legend: legend(look, { data: lineEntries(names) }) } : {}),
       grid: { left: isLikelihood ? 24 : 16, right: 18, top: isLikelihood ? 36 : 12, bottom: isLikelihood ? 34 : 16 },
       xAxis: axis(look, { min: 1, max: generationCount, integer: true, splitNumber: 4, axisLabel: { showMaxLabel: false }, ...(isLikelihood ? { name: 'generation', nameGap: 22 } : {}) }),
-      yAxis: axis(look, { splitNumber: 4, ...(log ? logRange([every]) : {}), ...(hasFloor && !is('all') ? { min: floor } : {}) }),
+      yAxis: axis(look, { splitNumber: 4, ...(log ? logRange([every]) : {}), ...(hasFloor && !is('all') ? { min: floor, axisLabel: { showMinLabel: false } } : {}) }),
       tooltip: tooltip(look, { trigger: 'axis', formatter: (found: { dataIndex: number }[]) => {
         const place = found[0]!.dataIndex;
         return tip(`Generation ${count(generations[place]!)}${generations[place]! <= burnIn ? ', burn-in' : ''}`, names.map((chain, index) => [chain, number(traces[index]![place], 6)] as [string, string]));
@@ -224,8 +223,8 @@ function coverageText(band: Band, isConverged: boolean): string {
   const name = isolated(band.measure);
   const held = `The band of what would be observed of ${name} holds ${percent(inside)} of ${band.n === null ? 'the' : count(band.n)} observed values`;
   const hint = isConverged ? '' : ' The chains have not converged, which may be the reason.';
-  if (inside < kWanted - kAround) return `${held}; it should hold about 90 %. It is too narrow: errors are larger, or have heavier tails, than the likelihood says.${hint}`;
-  if (inside > kWanted + kAround) return `${held}; it should hold about 90 %. It is wider than it need be: errors that grow with the values (Error_Share) or are correlated (Error_Correlation) may fit better.${hint}`;
+  if (inside < kWanted - kAround) return `${held}; it should hold about 90 %. It is too narrow: errors are larger, or have heavier tails, than the likelihood has them.${hint}`;
+  if (inside > kWanted + kAround) return `${held}; it should hold about 90 %. It is wider than it need be: the likelihood has larger errors than there are, and another form of it may fit better.${hint}`;
   return `${held}, about the 90 % that it should.`;
 }
 
