@@ -17,7 +17,6 @@ namespace mirevo {
 namespace {
 
 constexpr std::size_t kBins = 40;
-constexpr double kManyfold = 10.0;  // of the least value is the largest one: bins are of equal ratio
 
 /// Calls `take(state)` for each state behind burn-in.
 template <class Take>
@@ -214,8 +213,8 @@ DataTable marginalsTable(const DreamSampler& sampler, const ShownDimensions& dim
                          std::span<const std::vector<double>> priorDraws) {
   DataTable table{
       run_files::kMarginals,
-      {"Shares of the posterior and of the prior in bins over the range of the posterior, of equal width or, where it "
-       "spans more than a factor of ten, of equal ratio"},
+      {"Shares of the posterior and of the prior in bins over the range of the posterior: of equal width or, where the "
+       "prior is one of orders of magnitude, of equal ratio"},
       {"Name", "From", "To", "Posterior", "Prior"},
       {}};
   std::vector<std::vector<double>> columns(dimensions.names.size());
@@ -228,7 +227,7 @@ DataTable marginalsTable(const DreamSampler& sampler, const ShownDimensions& dim
     if (columns[j].empty()) continue;
     const auto [least, largest] = std::ranges::minmax(columns[j]);
     if (!(largest > least)) continue;
-    const bool isLogarithmic = least > 0.0 && largest > kManyfold * least;
+    const bool isLogarithmic = least > 0.0 && isOfMagnitudes(quantilesOf(prior[j]));
     const auto scaled = [isLogarithmic](double value) { return isLogarithmic ? std::log(value) : value; };
     const double origin = scaled(least);
     const double width = (scaled(largest) - origin) / kBins;

@@ -54,15 +54,25 @@ std::vector<const DimensionFigures*> worstFirst(std::span<const DimensionFigures
 
 }  // namespace
 
-double narrowingOf(std::span<const double> quantiles, std::span<const double> priorQuantiles) {
+bool isOfMagnitudes(std::span<const double> priorQuantiles) {
   constexpr double kManyfold = 10.0;
+  const double low = priorQuantiles.front();
+  const double high = priorQuantiles.back();
+  const double middle = priorQuantiles[priorQuantiles.size() / 2];
+  if (!(low > 0.0 && high > kManyfold * low)) return false;
+  const double place = (middle - low) / (high - low);
+  const double placeOfLogarithm = std::log(middle / low) / std::log(high / low);
+  return std::abs(placeOfLogarithm - 0.5) < std::abs(place - 0.5);
+}
+
+double narrowingOf(std::span<const double> quantiles, std::span<const double> priorQuantiles) {
   const auto ratio = [&](const auto& scaled) {
     const double before = scaled(priorQuantiles.back()) - scaled(priorQuantiles.front());
     return before > 0.0 ? (scaled(quantiles.back()) - scaled(quantiles.front())) / before
                         : std::numeric_limits<double>::quiet_NaN();
   };
-  const bool isWide = priorQuantiles.front() > 0.0 && priorQuantiles.back() > kManyfold * priorQuantiles.front();
-  if (isWide && quantiles.front() > 0.0) return ratio([](double value) { return std::log(value); });
+  if (isOfMagnitudes(priorQuantiles) && quantiles.front() > 0.0)
+    return ratio([](double value) { return std::log(value); });
   return ratio([](double value) { return value; });
 }
 

@@ -15,9 +15,14 @@ struct DimensionFigures {
   double narrowing = 0.0;  ///< narrowingOf() its quantiles
 };
 
+/// Whether the prior is one of orders of magnitude: positive, over more than a factor of ten, and with its median
+/// nearer to the middle of the logarithms than to that of the values. `priorQuantiles`: an odd number of them,
+/// ascending.
+bool isOfMagnitudes(std::span<const double> priorQuantiles);
+
 /// The range of the posterior, from its first to its last quantile, as a part of that of the prior; of the logarithms
-/// where the prior spans more than a factor of ten, as its range would otherwise be that of its largest values alone.
-/// NaN where the prior has none.
+/// where the prior isOfMagnitudes(), whose range is otherwise that of its largest values alone. NaN where the prior has
+/// none.
 double narrowingOf(std::span<const double> quantiles, std::span<const double> priorQuantiles);
 
 /// The limits at which chains count as converged.

@@ -41,11 +41,13 @@ TEST(PosteriorWords, SayWhatIsWorstAndWhatToDo) {
   EXPECT_FALSE(acceptanceWords(nan));
   EXPECT_FALSE(acceptanceWords(0.05));
   EXPECT_TRUE(acceptanceWords(0.049));
-  // Wide priors count by their logarithms: 1 to 10 of 1 to 1000 is a third.
-  const std::vector<double> narrow{1.0, 10.0};
-  EXPECT_NEAR(narrowingOf(narrow, std::vector<double>{1.0, 1000.0}), 1.0 / 3.0, 1e-12);
-  EXPECT_NEAR(narrowingOf(narrow, std::vector<double>{-8.0, 1000.0}), 9.0 / 1008.0, 1e-12);
-  EXPECT_TRUE(std::isnan(narrowingOf(narrow, std::vector<double>{4.0, 4.0})));
+  // A prior of orders of magnitude counts by its logarithms: 1 to 10 of 1 to 1000 is a third. A uniform one does not.
+  const std::vector<double> narrow{1.0, 5.0, 10.0};
+  EXPECT_NEAR(narrowingOf(narrow, std::vector<double>{1.0, 31.6, 1000.0}), 1.0 / 3.0, 1e-12);
+  EXPECT_NEAR(narrowingOf(narrow, std::vector<double>{1.0, 500.0, 1000.0}), 9.0 / 999.0, 1e-12);
+  EXPECT_NEAR(narrowingOf(narrow, std::vector<double>{-8.0, 31.6, 1000.0}), 9.0 / 1008.0, 1e-12);
+  EXPECT_NEAR(narrowingOf(std::vector<double>{2.0, 2.5, 3.0}, std::vector<double>{2.0, 4.0, 8.0}), 1.0 / 6.0, 1e-12);
+  EXPECT_TRUE(std::isnan(narrowingOf(narrow, std::vector<double>{4.0, 4.0, 4.0})));
 }
 
 }  // namespace

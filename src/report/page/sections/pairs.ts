@@ -12,6 +12,12 @@ const kRoom = { left: 74, right: 10, top: 8, bottom: 50 }; // around the matrix
 const kGap = 6;
 const kLabelRoom = 76; // pixels of a cell, from which its axes have numbers
 
+/** A name that fits beside a cell. In isolates, as the library keeps the widths of texts by the texts themselves, among which `__proto__` must not be. */
+const nameWithin = (name: string, pixels: number) => `\u2068${shorten(name, Math.max(3, Math.floor(pixels / 7)))}\u2069`;
+
+/** Of a cell, in pixels. */
+const heightOf = (most: number) => (most < 4 ? 170 : most < 6 ? 140 : 105);
+
 /** Between the colours from -1 to 1. */
 function colour(diverging: string[], value: number): string {
   const place = ((value + 1) / 2) * (diverging.length - 1);
@@ -26,12 +32,12 @@ function pairPlan(dimensions: PosteriorDimension[], correlations: Maybe[][], cho
   return {
     title: 'Parameters against one another',
     note: `Below the diagonal: states of the posterior. On it: their distribution.${correlations.length > 0 ? ' Above it: correlations. A narrow slanted cloud is a trade-off; a bent one shows little as a correlation.' : ''}`,
-    height: kRoom.top + kRoom.bottom + most * (most < 4 ? 170 : 105),
+    height: kRoom.top + kRoom.bottom + most * heightOf(most),
     fitsWidth: true,
     option: (look, _, width = kFileWidth) => {
       const shown = chosen().map((place) => ({ place, of: dimensions[place]! }));
       const size = shown.length;
-      const height = kRoom.top + kRoom.bottom + most * (most < 4 ? 170 : 105);
+      const height = kRoom.top + kRoom.bottom + most * heightOf(most);
       const across = (width - kRoom.left - kRoom.right - (size - 1) * kGap) / size;
       const down = (height - kRoom.top - kRoom.bottom - (size - 1) * kGap) / size;
       const hasLabels = across >= kLabelRoom && down >= 50;
@@ -46,11 +52,11 @@ function pairPlan(dimensions: PosteriorDimension[], correlations: Maybe[][], cho
         const quiet = { splitLine: { show: false }, axisTick: { show: false }, gridIndex: index, splitNumber: 2 };
         const labels = (on: boolean, of: PosteriorDimension) => ({ ...(scale(of) as { axisLabel?: object }).axisLabel, show: on && hasLabels, fontSize: 10, showMinLabel: false, showMaxLabel: false, hideOverlap: true });
         xAxes!.push(axis(look, column > row ? { ...quiet, show: false, min: 0, max: 1 } : { ...quiet, ...scale(beside.of), axisTick: { show: false },
-          axisLabel: labels(isBottom, beside.of), axisLine: { show: false }, ...(isBottom ? { name: shorten(beside.of.name, Math.max(3, Math.floor(across / 7))), nameGap: hasLabels ? 26 : 10, nameTextStyle: { color: look.ink } } : {}) }));
+          axisLabel: labels(isBottom, beside.of), axisLine: { show: false }, ...(isBottom ? { name: nameWithin(beside.of.name, across), nameGap: hasLabels ? 26 : 10, nameTextStyle: { color: look.ink } } : {}) }));
         yAxes!.push(axis(look, plain ? { ...quiet, scale: false, show: isDiagonal && isLeft, min: 0, axisLabel: { show: false }, axisLine: { show: false },
-          ...(isDiagonal && isLeft ? { name: shorten(below.of.name, Math.max(3, Math.floor(down / 7))), nameGap: hasLabels ? 52 : 10, nameTextStyle: { color: look.ink } } : {}), ...(column > row ? { max: 1 } : {}) }
+          ...(isDiagonal && isLeft ? { name: nameWithin(below.of.name, down), nameGap: hasLabels ? 52 : 10, nameTextStyle: { color: look.ink } } : {}), ...(column > row ? { max: 1 } : {}) }
           : { ...quiet, ...scale(below.of), axisTick: { show: false }, axisLabel: labels(isLeft, below.of), axisLine: { show: false },
-            ...(isLeft ? { name: shorten(below.of.name, Math.max(3, Math.floor(down / 7))), nameGap: hasLabels ? 52 : 10, nameTextStyle: { color: look.ink } } : {}) }));
+            ...(isLeft ? { name: nameWithin(below.of.name, down), nameGap: hasLabels ? 52 : 10, nameTextStyle: { color: look.ink } } : {}) }));
         const own = { xAxisIndex: index, yAxisIndex: index };
         if (column < row) {
           series!.push({ ...own, type: 'scatter', symbolSize: size > 5 ? 2.5 : 3.5, itemStyle: { color: look.best, opacity: 0.45 }, progressive: 0,

@@ -91,7 +91,7 @@ function narrowed({ narrowing, isHardlyNarrower }: PosteriorDimension): string {
 function knownTable({ dimensions }: Posterior): Node {
   const columns = [{ title: 'Parameter' }, ...['5 %', 'Median', '95 %'].map((title) => ({ title, number: true })),
     { title: 'Prior 5 %', number: true }, { title: 'Prior 95 %', number: true },
-    { title: 'Width', number: true, hint: 'From 5 to 95 %, as a part of that of the prior; of logarithms where the prior spans more than a factor of ten' }, { title: '' },
+    { title: 'Width', number: true, hint: 'From 5 to 95 %, as a part of that of the prior; of logarithms where the prior is one of orders of magnitude' }, { title: '' },
     { title: 'Most probable', number: true, hint: 'The state of the largest posterior density' }, { title: 'R\u2011hat', number: true }, { title: 'Eff. size', number: true, hint: 'Independent draws that would tell as much' }];
   const rows = dimensions.map((of) => [of.name, number(of.quantiles[0]), number(of.quantiles[2]), number(of.quantiles[4]), number(of.priorQuantiles[0]), number(of.priorQuantiles[4]),
     percent(of.narrowing, 2), narrowed(of), number(of.mostProbable), number(of.rHat, 3), of.effectiveSize === null ? '' : count(of.effectiveSize)]);
