@@ -1,5 +1,5 @@
 // States of the posterior, one parameter against another: a matrix of charts.
-import { axis, chart, kFileWidth, tip, tooltip, type ChartPlan } from '../chart';
+import { axis, chart, drawnName, kFileWidth, tip, tooltip, type ChartPlan } from '../chart';
 import type { Maybe, PosteriorDimension } from '../data';
 import { make, shorten } from '../dom';
 import { number } from '../format';
@@ -12,8 +12,8 @@ const kRoom = { left: 74, right: 10, top: 8, bottom: 50 }; // around the matrix
 const kGap = 6;
 const kLabelRoom = 76; // pixels of a cell, from which its axes have numbers
 
-/** A name that fits beside a cell. In isolates, as the library keeps the widths of texts by the texts themselves, among which `__proto__` must not be. */
-const nameWithin = (name: string, pixels: number) => `\u2068${shorten(name, Math.max(3, Math.floor(pixels / 7)))}\u2069`;
+/** A name that fits beside a cell. */
+const nameWithin = (name: string, pixels: number) => drawnName(shorten(name, Math.max(3, Math.floor(pixels / 7))));
 
 /** Of a cell, in pixels. */
 const heightOf = (most: number) => (most < 4 ? 170 : most < 6 ? 140 : 105);
