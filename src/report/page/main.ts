@@ -37,7 +37,7 @@ function sections(data: ReportData): Section[] {
     comparisonSection(data),
     sampled ? progressSection(data) : null,
     task === 'optimisation' ? historySection(data) : null,
-    task === 'uncertainty' ? distributionSection(data) : null,
+    task === 'uncertainty' || data.distributions?.length ? distributionSection(data) : null,
     sampled ? dottySection(data, task === 'uncertainty' ? 'Parameters against objectives' : 'Dotty plots') : null,
     task === 'optimisation' ? goodSetsSection(data) : null,
     failureSection(data),

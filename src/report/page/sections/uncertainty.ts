@@ -47,7 +47,7 @@ function histogramPlan(name: string, values: Maybe[], wantsLog = false, distribu
           return { type: 'rect', shape: { x: left!, y: top!, width: Math.max(1, right! - left! - 1), height: bottom! - top! }, style: { fill: look.bars } };
         },
       }, ...(distribution ? [{
-        type: 'line', symbol: 'none', color: look.best, lineStyle: { color: look.best, width: 2 },
+        type: 'line', symbol: 'none', color: look.initial, lineStyle: { color: look.initial, width: 2 },
         data: bins.map((bin, index) => [middle(bin), wanted[index]]),
       }] : [])],
     }),
