@@ -303,7 +303,8 @@ void writeBands(JsonWriter& json, const ReportData& data) {
     const bool isThinned = whole.seconds.size() > most;
     const ReportedBand& band = isThinned ? thinned(whole, most) : whole;
     json.beginObject().member("measure", band.measure).optionalMember("quantity", band.label.quantity);
-    json.optionalMember("unit", band.label.unit).member("isTotal", band.isTotal);
+    json.optionalMember("unit", band.label.unit);
+    if (band.isTotal) json.member("isTotal", true);
     writeTimes(json, band.seconds);
     json.key("observed").numbers(band.observed, Digits::drawn).key("p5").numbers(band.lower, Digits::drawn);
     json.key("p50").numbers(band.median, Digits::drawn).key("p95").numbers(band.upper, Digits::drawn);
