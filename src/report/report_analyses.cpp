@@ -167,6 +167,17 @@ std::vector<ReportedBand> reportedBands(const RunConfig& config, const std::stri
     band->measure = pairName(config.measures, i);
     band->label = labels[k];
     bands.push_back(std::move(*band));
+    const std::string total = runFilePath(filePrefix, run_files::kTotalBand, static_cast<int>(i) + 1);
+    std::error_code ignored;
+    if (!std::filesystem::exists(total, ignored) && !record.linesOf(fileNameOf(total))) continue;
+    fault.clear();
+    auto withErrors = readBand(total, record.linesOf(fileNameOf(total)), fault);
+    if (!fault.empty()) faults.push_back(fault);
+    if (!withErrors) continue;
+    withErrors->measure = bands.back().measure;
+    withErrors->label = labels[k];
+    withErrors->isTotal = true;
+    bands.push_back(std::move(*withErrors));
   }
   return bands;
 }

@@ -11,6 +11,7 @@
 #include "report/failure_reasons.h"
 #include "report/report_glue.h"
 #include "report/report_morris.h"
+#include "report/report_posterior.h"
 #include "report/report_sobol.h"
 #include "report/series_above.h"
 #include "report/series_labels.h"
@@ -111,8 +112,9 @@ struct ReportedBand {
   std::size_t insideCount = 0;       ///< those inside the band
   double meanWidth = 0.0;            ///< BandCoverage, at the observations; likewise
   double relativeWidth = 0.0;
-  int fewestRuns = 0;  ///< of the times with a band
-  int mostRuns = 0;    ///< where the file does not say it, the runs that succeeded
+  int fewestRuns = 0;    ///< of the times with a band
+  int mostRuns = 0;      ///< where the file does not say it, the runs that succeeded
+  bool isTotal = false;  ///< of what would be observed: with the errors
 };
 
 /// A parameter without a variance, and why.
@@ -205,6 +207,7 @@ struct ReportData {
   std::vector<ReportedScreening> morris;
   std::optional<ReportedSobol> sobol;
   std::optional<ReportedGlue> glue;
+  std::optional<ReportedPosterior> posterior;
   std::vector<ReportedDistribution> distributions;  ///< one per variable parameter, or none at all
   std::optional<ReportedSampleSensitivity> sampleSensitivity;
   std::vector<std::string> summary;  ///< the closing lines of the result file

@@ -304,6 +304,7 @@ void writeBands(JsonWriter& json, const ReportData& data) {
     const ReportedBand& band = isThinned ? thinned(whole, most) : whole;
     json.beginObject().member("measure", band.measure).optionalMember("quantity", band.label.quantity);
     json.optionalMember("unit", band.label.unit);
+    if (band.isTotal) json.member("isTotal", true);
     writeTimes(json, band.seconds);
     json.key("observed").numbers(band.observed, Digits::drawn).key("p5").numbers(band.lower, Digits::drawn);
     json.key("p50").numbers(band.median, Digits::drawn).key("p95").numbers(band.upper, Digits::drawn);
@@ -380,6 +381,7 @@ std::string reportJson(const ReportData& data) {
   if (!data.morris.empty()) writeMorris(json, data.morris);
   if (data.sobol) writeSobol(json, *data.sobol);
   if (data.glue) writeGlue(json, *data.glue);
+  if (data.posterior) writePosterior(json, *data.posterior);
   writeSample(json, data);
   json.member("summary", data.summary).endObject();
   return json.take();

@@ -464,7 +464,7 @@ void ReportBuilder::addAnalyses() {
     for (const std::string& fault : faults) note(fault + ".");
     const std::vector<bool>& ok = data_.evaluations.ok;
     for (ReportedBand& band : data_.bands) {
-      if (band.runs.empty())
+      if (band.runs.empty() && task.chains == nullptr)  // those of chains are of their states
         band.mostRuns = analysed.value_or(static_cast<int>(std::count(ok.begin(), ok.end(), true)));
     }
   }
@@ -482,6 +482,11 @@ void ReportBuilder::addAnalyses() {
     std::string fault;
     data_.glue = reportedGlue(filePrefix_, config_.parameters, fault);
     if (!fault.empty()) note(fmt::format("The weights of GLUE are not shown: {}.", fault));
+  }
+  if (task.chains != nullptr && hasAnalysis) {
+    std::vector<std::string> faults;
+    data_.posterior = reportedPosterior(filePrefix_, *task.chains, space().size(), faults);
+    for (const std::string& fault : faults) note(fault + ".");
   }
   if (task.distributions != nullptr) data_.distributions = reportedDistributions(*task.distributions, space());
   if ((task.distributions != nullptr || task.isGlue) && hasAnalysis) {

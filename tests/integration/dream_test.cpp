@@ -137,6 +137,11 @@ TEST(Dream, AnInterruptedRunHasThePosteriorOfItsGenerationsAndGoesOnToTheSameBit
   const std::string setup = writeDream(other, twoSlots, dream);
   EXPECT_EQ(runProgram({setup}).exitCode, 1);
   EXPECT_THAT(other.read("basin_Posterior.dat"), HasSubstr("Unfinished run"));
+  if (other.exists("basin_Report.html")) {  // not in a build without its page
+    const std::string page = other.read("basin_Report.html");
+    EXPECT_NE(page.find("The run was interrupted. Restart = 1 lets the chains go on from here"), std::string::npos);
+    EXPECT_NE(page.find("\"logLikelihoods\":[["), std::string::npos);
+  }
   other.write("sound", "");
   const ProgramResult goneOn = runProgram({setup});
   EXPECT_EQ(goneOn.exitCode, 0) << goneOn.error;

@@ -8,6 +8,7 @@
 
 #include <fmt/format.h>
 
+#include "algorithms/bayes/posterior_words.h"
 #include "algorithms/numbers/sample_summary.h"
 #include "common/run_files.h"
 #include "common/text.h"
@@ -15,7 +16,6 @@
 namespace mirevo {
 namespace {
 
-constexpr double kTradeOff = 0.7;  // correlation from which two parameters are said to trade off
 constexpr std::size_t kBins = 40;
 
 /// Calls `take(state)` for each state behind burn-in.
@@ -62,36 +62,22 @@ std::string endText(const DreamSettings& settings, DreamEnd end) {
   return "The chains were interrupted";
 }
 
-/// Whether the chains agree, and what to do where they do not.
-void appendConvergence(const DreamSettings& settings, const ShownDimensions& dimensions,
-                       const PosteriorSummary& summary, std::vector<std::string>& lines) {
-  std::string apart;
-  std::string few;
+std::vector<DimensionFigures> figuresOf(const ShownDimensions& dimensions, const PosteriorSummary& summary) {
+  std::vector<DimensionFigures> figures;
   for (std::size_t j = 0; j < dimensions.names.size(); ++j) {
     const PosteriorSummary::Dimension& own = summary.dimensions[j];
-    if (!(own.rHat <= settings.rHatLimit)) {
-      apart += fmt::format("{}{} ({:.3g})", apart.empty() ? "" : ", ", dimensions.names[j], own.rHat);
-    } else if (!(own.effectiveSize >= settings.effectiveSize)) {
-      few += fmt::format("{}{} ({:.0f})", few.empty() ? "" : ", ", dimensions.names[j], own.effectiveSize);
-    }
+    figures.push_back(
+        {dimensions.names[j], own.rHat, own.effectiveSize, narrowingOf(own.quantiles, own.priorQuantiles)});
   }
-  if (apart.empty() && few.empty()) {
-    lines.emplace_back("The chains have converged, as far as R-hat and the effective sample sizes tell");
-    return;
-  }
-  if (!apart.empty()) {
-    lines.push_back(fmt::format(
-        "Warning: The chains have not converged: R-hat is above {:g} for {}. The quantiles below are not those of the "
-        "posterior yet. Raise Sample_Size; where R-hat stays large, the posterior may have several peaks (more chains "
-        "help: Chain_Count) or burn-in is too short (Burn_In_Share), which the states in _Chains.dat show",
-        settings.rHatLimit, apart));
-  }
-  if (!few.empty()) {
-    lines.push_back(fmt::format(
-        "Warning: The chains agree, but the effective sample size is below {:g} for {}: means are known to about a "
-        "standard deviation divided by its square root, the 5 and 95 % quantiles less well. Raise Sample_Size",
-        settings.effectiveSize, few));
-  }
+  return figures;
+}
+
+/// Whether the chains agree, and what to do where they do not.
+void appendConvergence(const DreamSettings& settings, std::span<const DimensionFigures> figures,
+                       std::vector<std::string>& lines) {
+  const ConvergenceWords words = convergenceWords(figures, {settings.rHatLimit, settings.effectiveSize});
+  const char* const mark = words.state == Convergence::reached ? "" : "Warning: ";
+  for (const std::string& finding : words.findings) lines.push_back(mark + finding);
 }
 
 void appendCounts(const DreamSampler& sampler, std::vector<std::string>& lines) {
@@ -102,12 +88,8 @@ void appendCounts(const DreamSampler& sampler, std::vector<std::string>& lines) 
       fmt::format("Acceptance rate behind burn-in: {} of {} proposals ({} of parallel-direction updates, {} "
                   "of snooker updates)",
                   percent(all.rate()), all.proposals, percent(parallel.rate()), percent(snooker.rate())));
-  if (all.proposals > 0 && all.rate() < 0.05) {
-    lines.emplace_back(
-        "Warning: Few proposals are accepted: the chains mix slowly. Bounds far wider than the posterior, a posterior "
-        "at a bound, a likelihood far too sharp (a fixed Error_Deviation that is too small) or rough results of the "
-        "model are usual reasons");
-  }
+  const auto few = all.proposals > 0 ? acceptanceWords(all.rate()) : std::nullopt;
+  if (few) lines.push_back("Warning: " + *few);
   if (sampler.outlierCount() > 0) {
     lines.push_back(fmt::format("{} during burn-in: each went on from the state of the best chain",
                                 countText(static_cast<std::size_t>(sampler.outlierCount()), "outlier chain")));
@@ -133,24 +115,12 @@ void appendQuantiles(const ShownDimensions& dimensions, const PosteriorSummary& 
 }
 
 void appendTradeOffs(const ShownDimensions& dimensions, const PosteriorSummary& summary,
-                     std::string_view correlationFile, std::vector<std::string>& lines) {
+                     std::span<const DimensionFigures> figures, std::string_view correlationFile,
+                     std::vector<std::string>& lines) {
   const auto& matrix = summary.correlations;
-  for (const auto& [i, j] : largestEntries(matrix)) {
-    if (std::abs(matrix[i][j]) < kTradeOff) continue;
-    lines.push_back(
-        fmt::format("{} and {} trade off: a correlation of {:.2f}. The data know a combination of them "
-                    "better than either",
-                    dimensions.names[i], dimensions.names[j], matrix[i][j]));
-  }
-  // The 90 % ranges on the shown scale: that of the posterior as a part of that of the prior.
-  for (std::size_t j = 0; j < dimensions.modelParameterCount; ++j) {
-    const PosteriorSummary::Dimension& own = summary.dimensions[j];
-    const double before = own.priorQuantiles.back() - own.priorQuantiles.front();
-    const double after = own.quantiles.back() - own.quantiles.front();
-    if (before > 0.0 && after > 0.9 * before) {
-      lines.push_back(fmt::format("{}: the data say little of it, its posterior is hardly narrower than its prior",
-                                  dimensions.names[j]));
-    }
+  for (std::string& line : tradeOffWords(dimensions.names, matrix)) lines.push_back(std::move(line));
+  for (const DimensionFigures& one : figures.first(dimensions.modelParameterCount)) {
+    if (isHardlyNarrower(one)) lines.push_back(hardlyNarrowerWords(one));
   }
   lines.emplace_back();
   for (std::string& line : formatCorrelation("Correlation", dimensions.names, matrix, correlationFile)) {
@@ -241,10 +211,12 @@ DataTable posteriorTable(const PosteriorSummary& summary, const ShownDimensions&
 
 DataTable marginalsTable(const DreamSampler& sampler, const ShownDimensions& dimensions,
                          std::span<const std::vector<double>> priorDraws) {
-  DataTable table{run_files::kMarginals,
-                  {"Shares of the posterior and of the prior in bins of equal width over the range of the posterior"},
-                  {"Name", "From", "To", "Posterior", "Prior"},
-                  {}};
+  DataTable table{
+      run_files::kMarginals,
+      {"Shares of the posterior and of the prior in bins over the range of the posterior: of equal width or, where the "
+       "prior is one of orders of magnitude, of equal ratio"},
+      {"Name", "From", "To", "Posterior", "Prior"},
+      {}};
   std::vector<std::vector<double>> columns(dimensions.names.size());
   forPosterior(sampler, [&](const ChainHistory::State& state) {
     const std::vector<double> values = dimensions.shown(state.point);
@@ -255,12 +227,19 @@ DataTable marginalsTable(const DreamSampler& sampler, const ShownDimensions& dim
     if (columns[j].empty()) continue;
     const auto [least, largest] = std::ranges::minmax(columns[j]);
     if (!(largest > least)) continue;
-    const double width = (largest - least) / kBins;
+    const bool isLogarithmic = least > 0.0 && isOfMagnitudes(quantilesOf(prior[j]));
+    const auto scaled = [isLogarithmic](double value) { return isLogarithmic ? std::log(value) : value; };
+    const double origin = scaled(least);
+    const double width = (scaled(largest) - origin) / kBins;
+    const auto edge = [&](std::size_t bin) {
+      const double value = origin + static_cast<double>(bin) * width;
+      return isLogarithmic ? std::exp(value) : value;
+    };
     const auto sharesOf = [&, from = least, to = largest](std::span<const double> values) {
       std::vector<double> shares(kBins, 0.0);
       for (const double value : values) {
         if (value < from || value > to) continue;
-        const auto bin = std::min(static_cast<std::size_t>((value - from) / width), kBins - 1);
+        const auto bin = std::min(static_cast<std::size_t>((scaled(value) - origin) / width), kBins - 1);
         shares[bin] += 1.0 / static_cast<double>(values.size());
       }
       return shares;
@@ -268,8 +247,7 @@ DataTable marginalsTable(const DreamSampler& sampler, const ShownDimensions& dim
     const std::vector<double> after = sharesOf(columns[j]);
     const std::vector<double> before = sharesOf(prior[j]);
     for (std::size_t b = 0; b < kBins; ++b) {
-      const double from = least + static_cast<double>(b) * width;
-      table.rows.push_back({dimensions.names[j], from, from + width, after[b], before[b]});
+      table.rows.push_back({dimensions.names[j], edge(b), edge(b + 1), after[b], before[b]});
     }
   }
   return table;
@@ -313,10 +291,11 @@ std::vector<std::string> formatPosterior(const DreamSettings& settings, const Dr
       fmt::format("Burn-in: the first {} generations ({:g} of Sample_Size), which are left out; the "
                   "posterior is {} states behind it",
                   *sampler.burnIn(), settings.burnInShare, summary->draws));
-  appendConvergence(settings, dimensions, *summary, lines);
+  const std::vector<DimensionFigures> figures = figuresOf(dimensions, *summary);
+  appendConvergence(settings, figures, lines);
   appendCounts(sampler, lines);
   appendQuantiles(dimensions, *summary, lines);
-  appendTradeOffs(dimensions, *summary, correlationFile, lines);
+  appendTradeOffs(dimensions, *summary, figures, correlationFile, lines);
   return lines;
 }
 

@@ -44,7 +44,8 @@ std::optional<PosteriorSummary> summarisePosterior(const DreamSampler& sampler, 
 /// Every state of every chain; rows with 1 in the column Burn_In are no part of the posterior.
 DataTable chainsTable(const DreamSampler& sampler, const ShownDimensions& dimensions);
 DataTable posteriorTable(const PosteriorSummary& summary, const ShownDimensions& dimensions);
-/// Posterior and prior as histograms with bins of equal width, for drawing.
+/// Posterior and prior as histograms, for drawing: with bins of equal width, or of equal ratio where the prior
+/// isOfMagnitudes().
 DataTable marginalsTable(const DreamSampler& sampler, const ShownDimensions& dimensions,
                          std::span<const std::vector<double>> priorDraws);
 /// R-hat and effective sample sizes each time that they were looked at.

@@ -328,8 +328,12 @@ export function axis(look: Look, plan: AxisPlan): object {
   };
 }
 
+/** A name that is drawn. In isolates: the library keeps the widths of texts in an object by the texts themselves, among which `__proto__` must not be. */
+export const drawnName = (name: string) => `\u2068${name}\u2069`;
+
 export function legend(look: Look, more: object = {}): object {
   return {
+    formatter: drawnName,
     top: 0, left: 'center', type: 'scroll', itemWidth: 22, itemHeight: 14,
     textStyle: { color: look.ink, width: 220, overflow: 'truncate' }, inactiveColor: look.faded,
     pageTextStyle: { color: look.muted }, pageIconColor: look.ink, pageIconInactiveColor: look.rule, ...more,

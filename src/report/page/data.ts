@@ -172,6 +172,7 @@ export interface Band extends Times {
   measure: string;
   quantity?: string | null;
   unit?: string | null;
+  isTotal?: boolean; // of what would be observed: with the errors
   observed: Maybe[];
   p5: Maybe[];
   p50: Maybe[];
@@ -207,6 +208,50 @@ export interface Glue {
     drawn: number[]; // share of the sets that succeeded, per bin
     weighed: number[]; // share of the weight
   }[];
+}
+
+/** A parameter of the model or of its errors that Markov chains sample. */
+export interface PosteriorDimension {
+  name: string;
+  isOfErrors: boolean;
+  mean: Maybe;
+  standardDeviation: Maybe;
+  mostProbable: Maybe;
+  rHat: Maybe;
+  effectiveSize: Maybe;
+  narrowing: Maybe; // its 5 to 95 % range as a part of that of the prior
+  isHardlyNarrower: boolean;
+  logarithmic: boolean;
+  quantiles: Maybe[]; // at 5, 25, 50, 75 and 95 %; empty where they are not known
+  priorQuantiles: Maybe[];
+  edges: number[]; // of the bins
+  posterior: number[]; // shares in the bins
+  prior: number[];
+  rHats: Maybe[]; // at `checkedRuns`
+  effectiveSizes: Maybe[];
+  traces: Maybe[][]; // one row per drawn chain, at `generations`
+  draws: Maybe[]; // some states behind burn-in, the same for all
+}
+
+/** What Markov chains have found. Traces and draws are thinned, figures are of all states. */
+export interface Posterior {
+  state?: 'reached' | 'fewDraws' | 'apart'; // absent where there is no posterior
+  findings?: string[]; // on convergence
+  tradeOffs?: string[];
+  advice: string[];
+  rHatLimit: number;
+  effectiveLimit: number;
+  chains: number;
+  generationCount: number;
+  burnIn: number; // generations
+  states: number; // behind burn-in
+  acceptance: Maybe;
+  chainAcceptance: Maybe[];
+  dimensions: PosteriorDimension[];
+  generations: number[]; // that the traces show
+  logLikelihoods: Maybe[][];
+  checkedRuns: number[];
+  correlations: Maybe[][]; // empty where they are not known
 }
 
 export interface Covariance {
@@ -334,6 +379,7 @@ export interface ReportData {
   morris: Screening[];
   sobol?: Sobol | null;
   glue?: Glue | null;
+  posterior?: Posterior | null;
   distributions?: Distribution[]; // one per variable parameter, or none
   sampleSensitivity?: SampleSensitivity | null;
   summary: string[];

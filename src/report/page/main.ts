@@ -9,6 +9,7 @@ import { glueSection } from './sections/glue';
 import { historySection } from './sections/histories';
 import { morrisSection } from './sections/morris';
 import { failureSection, head, parameterSection, resultSection, runSection, summarySection } from './sections/overview';
+import { posteriorSection } from './sections/posterior';
 import { dottySection, goodSetsSection, progressSection } from './sections/search';
 import { sampleSection } from './sections/sample';
 import type { Section } from './sections/section';
@@ -24,6 +25,7 @@ function sections(data: ReportData): Section[] {
   const all = [
     bandSection(data),
     glueSection(data),
+    posteriorSection(data),
     sensitivitySection(data),
     morrisSection(data),
     sobolSection(data),
@@ -35,7 +37,7 @@ function sections(data: ReportData): Section[] {
     comparisonSection(data),
     sampled ? progressSection(data) : null,
     task === 'optimisation' ? historySection(data) : null,
-    task === 'uncertainty' ? distributionSection(data) : null,
+    task === 'uncertainty' || data.distributions?.length ? distributionSection(data) : null,
     sampled ? dottySection(data, task === 'uncertainty' ? 'Parameters against objectives' : 'Dotty plots') : null,
     task === 'optimisation' ? goodSetsSection(data) : null,
     failureSection(data),

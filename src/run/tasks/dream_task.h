@@ -32,7 +32,7 @@ class DreamTask final : public Task {
   /// Of the generations that are complete.
   std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const override;
   std::optional<int> evaluationsInBatches() const override { return sampler_ ? sampler_->runs() : 0; }
-  TaskReport report() const override { return {.hasBands = true}; }
+  TaskReport report() const override { return {.hasBands = true, .chains = &dream.sampler}; }
 
   UncertaintySettings settings;  ///< what all forms of the task have in common
   DreamSection dream;

@@ -30,7 +30,10 @@ class GlueTask final : public Task {
   void requireSets(const SearchSpace& space, const Feasibility& feasibility) const override;
   TaskOutcome run(const TaskContext& context) override;
   std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const override;
-  TaskReport report() const override { return {.hasBands = true, .isGlue = true}; }
+  TaskReport report() const override {
+    const ParameterDistributions* drawnFrom = isOfEarlierRun() ? nullptr : &settings.distributions;
+    return {.hasBands = true, .isGlue = true, .distributions = drawnFrom};
+  }
 
   UncertaintySettings settings;  ///< what all forms of the uncertainty analysis have in common
   GlueSettings glue;

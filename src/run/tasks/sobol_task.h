@@ -29,7 +29,7 @@ class SobolTask final : public Task {
   bool usesExactMeasures() const override { return true; }
   TaskOutcome run(const TaskContext& context) override;
   std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const override;
-  TaskReport report() const override { return {.sobol = &settings}; }
+  TaskReport report() const override { return {.sobol = &settings, .distributions = &distributions_}; }
 
   SobolSettings settings;
 

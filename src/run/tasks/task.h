@@ -31,6 +31,7 @@ namespace mirevo {
 
 class ParameterDistributions;
 struct SensitivitySettings;
+struct DreamSettings;
 struct SobolSettings;
 
 /// A form of a task and the keyword that selects it.
@@ -124,6 +125,7 @@ struct TaskReport {
   const SensitivitySettings* sensitivity = nullptr;       ///< for a local sensitivity analysis, else null
   bool hasMorris = false;                                 ///< it writes the table of a Morris screening
   const SobolSettings* sobol = nullptr;                   ///< for Sobol' indices, else null
+  const DreamSettings* chains = nullptr;                  ///< of Markov chains, else null
   const ParameterDistributions* distributions = nullptr;  ///< from which the sets were drawn; null: none
   std::vector<std::string> runNames = {};  ///< of the evaluations, from the first on; empty where one has none
 };

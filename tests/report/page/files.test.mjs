@@ -25,7 +25,7 @@ const kept = (button) => button.evaluate((element) => { element.click(); return 
 /** Cells of a file whose lines end with CR and LF, quotes as in RFC 4180. */
 const cellsOf = (text) => text.trimEnd().split('\r\n').map((line) => line.match(/("([^"]|"")*"|[^,"]*)(,|$)/g).slice(0, line.endsWith(',') ? undefined : -1));
 
-for (const name of ['optimisation', 'uncertainty', 'sensitivity', 'screening', 'sobol']) {
+for (const name of ['optimisation', 'uncertainty', 'dream', 'sensitivity', 'screening', 'sobol']) {
   test(`${name}: every figure is taken as a drawing and as a table, whatever the names`, async () => {
     const { page, complaints } = await browser.openReport(sample.hostile(sample.dataOf(name)), { colorScheme: 'dark' });
     const names = new Set();

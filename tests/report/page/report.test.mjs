@@ -51,9 +51,11 @@ const cases = {
     kOptimisation.filter((id) => id !== 'failures')],
   'an uncertainty analysis': [sample.dataOf('uncertainty'), 1 + 2 + 3 + 1 + 5 + 2, ['band', 'sample-sensitivity', 'series', 'parameters', 'results', 'compared', 'progress', 'distributions', 'dotty', 'failures', 'run', 'summary']],
   'GLUE': [sample.dataOf('glue'), 1 + 4 + 3 + 1 + 5 + 2, ['band', 'glue', 'series', 'parameters', 'results', 'compared', 'progress', 'distributions', 'dotty', 'failures', 'run', 'summary']],
+  'DREAM': [sample.dataOf('dream'), 2 + 12 + 4 + 3 + 2, ['band', 'posterior', 'series', 'parameters', 'results', 'compared', 'progress', 'distributions', 'dotty', 'failures', 'run', 'summary']],
+  'DREAM with hostile names': [sample.hostile(sample.dataOf('dream')), 23, null, true],
   'a sensitivity analysis': [sample.dataOf('sensitivity'), 4 + 3, ['sensitivity', 'series', 'parameters', 'results', 'compared', 'run', 'summary']],
-  'Sobol indices': [sample.dataOf('sobol'), 4 + 5 + 2, ['sobol', 'series', 'parameters', 'results', 'compared', 'progress', 'dotty', 'run', 'summary']],
-  'Sobol indices with hostile names': [sample.hostile(sample.dataOf('sobol')), 11, null, true],
+  'Sobol indices': [sample.dataOf('sobol'), 4 + 5 + 6 + 2, ['sobol', 'series', 'parameters', 'results', 'compared', 'progress', 'distributions', 'dotty', 'run', 'summary']],
+  'Sobol indices with hostile names': [sample.hostile(sample.dataOf('sobol')), 17, null, true],
   'a Morris screening': [sample.dataOf('screening'), 4 + 3, ['morris', 'series', 'parameters', 'results', 'compared', 'run', 'summary']],
   'scenario runs': [sample.dataOf('scenarios'), 4 + 1 + 2, ['series', 'parameters', 'results', 'compared', 'progress', 'dotty', 'run', 'summary']],
   'a run without an evaluation': [sample.empty(), 0, ['run']],
@@ -274,6 +276,73 @@ test('GLUE says which parameters the observations tell something of, and how muc
   await withReport(data, {}, async (page) => {
     assert.equal(await page.locator('#glue figure').count(), 0);
     assert.ok((await page.locator('#glue').textContent()).includes('neither quantiles nor bands'));
+  });
+});
+
+/** A posterior of so many dimensions, those of a short run again and again. */
+function ofDimensions(count) {
+  const { posterior } = sample.dataOf('dream');
+  const own = posterior.dimensions;
+  posterior.dimensions = Array.from({ length: count }, (_, place) => ({ ...own[place % own.length], name: `p${place}` }));
+  posterior.correlations = posterior.dimensions.map((_, row) => posterior.dimensions.map((__, column) => (row === column ? 1 : row + column === count - 1 ? -0.9 : 0.1)));
+  return posterior;
+}
+
+test('chains say whether they have converged, what to do, which parameters trade off, and how much lies in the bands', async () => {
+  const data = sample.dataOf('dream');
+  await withReport(data, {}, async (page) => {
+    const shown = await page.locator('#posterior').textContent();
+    assert.equal(await page.locator('#posterior .findings .warning').count(), 1);
+    for (const text of ['The chains have not converged: R-hat is above 1.05 for sigma0 of flow', 'The log-likelihood still rises behind burn-in', 'sigma0 of flow and phi of flow trade off: a correlation of -0.86',
+      'holds 100 % of 365 observed values; it should hold about 90 %. It is wider', 'what follows is not the posterior yet', '4 chains of 129 generations; the first 25 are burn-in']) assert.ok(shown.includes(text), text);
+    const shaded = await page.$$eval('#posterior figure', (figures) => figures.map((figure) => window.drawnOptions(figure)?.series[0].markArea?.data?.[0]?.[1]?.xAxis).filter((end) => end));
+    assert.deepEqual(shaded, [25, 25, 25, 25, 25], 'the burn-in of each trace');
+    const limits = await page.$$eval('#posterior figure', (figures) => figures.map((figure) => window.drawnOptions(figure)?.series[0].markLine?.data?.[0]?.yAxis).filter((limit) => limit));
+    assert.deepEqual(limits, [1.05, 400]);
+  });
+  Object.assign(data.posterior, { state: 'reached', findings: ['The chains have converged'], advice: [], tradeOffs: [] });
+  Object.assign(data.band[1], { inside: 0.91 });
+  data.posterior.dimensions.forEach((dimension, place) => Object.assign(dimension, { narrowing: [0.3, 0.95, 0.05, 0.2][place], isHardlyNarrower: place === 1 }));
+  await withReport(data, {}, async (page) => {
+    const shown = await page.locator('#posterior').textContent();
+    assert.equal(await page.locator('#posterior .findings .good').count(), 1);
+    for (const text of ['about the 90 % that it should', 'No two parameters trade off', 'The data have narrowed \u2068a\u2069 most: its 5 to 95 % range is 30 %', 'They say little of \u2068b\u2069']) assert.ok(shown.includes(text), text);
+    assert.ok(!shown.includes('not the posterior yet'));
+  });
+});
+
+test('chains that ended in burn-in, and those whose other tables cannot be read, are shown alone', async () => {
+  const data = sample.dataOf('dream');
+  const { posterior } = data;
+  const known = ['mean', 'standardDeviation', 'mostProbable', 'rHat', 'effectiveSize', 'narrowing'];
+  for (const dimension of posterior.dimensions) {
+    for (const name of known) dimension[name] = null;
+    for (const name of ['quantiles', 'priorQuantiles', 'edges', 'posterior', 'prior', 'rHats', 'effectiveSizes', 'draws']) dimension[name] = [];
+  }
+  Object.assign(posterior, { state: undefined, findings: undefined, tradeOffs: undefined, correlations: [], checkedRuns: [], burnIn: 129, states: 0, acceptance: null, chainAcceptance: [null, null, null, null] });
+  data.band = [];
+  await withReport(data, {}, async (page) => {
+    assert.equal(await page.locator('#posterior figure').count(), 5);
+    assert.deepEqual(await blankCharts(page), []);
+    assert.match(await page.locator('#posterior').textContent(), /There is no posterior: the chains have not come far enough/);
+  });
+});
+
+test('of many parameters the pairs with the strongest correlations are drawn, and others can be chosen', async () => {
+  const data = sample.dataOf('dream');
+  data.posterior = ofDimensions(30);
+  await withReport(data, {}, async (page) => {
+    const pressed = () => page.$$eval('#posterior .picks [aria-pressed="true"]', (buttons) => buttons.map((button) => button.textContent));
+    const grids = () => page.locator('#posterior figure', { hasText: 'Parameters against one another' }).evaluate((figure) => window.drawnOptions(figure).grid.length);
+    assert.deepEqual(await pressed(), ['p0', 'p1', 'p2', 'p3', 'p4', 'p5', 'p6', 'p7']);
+    const figure = page.locator('#posterior figure', { hasText: 'Parameters against one another' });
+    await figure.scrollIntoViewIfNeeded();
+    await page.locator('#posterior .picks button', { hasText: /^p29$/ }).click();
+    assert.deepEqual((await pressed()).at(-1), 'p29');
+    assert.equal((await pressed()).length, 8);
+    await page.locator('#posterior .picks button', { hasText: /^p29$/ }).click();
+    assert.equal(await grids(), 49);
+    assert.deepEqual(await blankCharts(page), []);
   });
 });
 

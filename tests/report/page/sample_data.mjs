@@ -106,6 +106,16 @@ export function hostile(data) {
     for (const parameter of screening.parameters) parameter.name = rename(parameter.name);
     Object.assign(screening.parameters[0], { sigma: [1, null, null], verdict: 'fix' });
   }
+  if (data.posterior) {
+    for (const dimension of data.posterior.dimensions) dimension.name = rename(dimension.name);
+    Object.assign(data.posterior, { findings: [...kHostile], tradeOffs: [...kHostile], advice: [...kHostile] });
+    const [first] = data.posterior.dimensions;
+    Object.assign(first, { mostProbable: null, narrowing: null, effectiveSize: null });
+    first.rHats.fill(null);
+    first.traces[0].fill(null, 5, 9);
+    data.posterior.logLikelihoods[0][0] = null;
+    data.posterior.correlations[0][1] = null;
+  }
   if (data.sobol) {
     data.sobol.factors = data.sobol.factors.map(rename);
     for (const output of data.sobol.outputs) output.name = rename(output.name);

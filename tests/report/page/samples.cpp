@@ -10,6 +10,7 @@ int main(int argc, char** argv) {
       {"short", {.maxEvaluations = 12}},
       {"uncertainty", {.option = 3, .maxEvaluations = 120, .modelArguments = "--fail-above 6"}},
       {"glue", {.option = 3, .maxEvaluations = 120, .modelArguments = "--fail-above 9.5"}},
+      {"dream", {.option = 3, .maxEvaluations = 400, .modelArguments = "--fail-above 9.5"}},
       {"sensitivity", {.option = 1}},
       {"screening", {.option = 1}},
       {"sobol", {.option = 1}},
@@ -25,8 +26,10 @@ int main(int argc, char** argv) {
       folder.editSetup("Sensitivity_Type = 0",
                        "Sensitivity_Type = 'Sobol'\n[SOBOL]\nSample_Size = 64\nSecond_Order = 1\n[/SOBOL]");
     }
-    if (name == "glue") {
-      folder.editSetup("Uncertainty_Type = 1", "Uncertainty_Type = 'GLUE'\n[GLUE]\nBehavioural_Threshold = 1\n[/GLUE]");
+    if (name == "glue" || name == "dream") {
+      folder.editSetup("Uncertainty_Type = 1",
+                       name == "glue" ? "Uncertainty_Type = 'GLUE'\n[GLUE]\nBehavioural_Threshold = 1\n[/GLUE]"
+                                      : "Uncertainty_Type = 'DREAM'\n[DREAM]\nLikelihood = 'AR(1)'\n[/DREAM]");
       // Without distributions of their own, parameters are as likely anywhere between their bounds.
       const std::string text = folder.read("basin.kdx");
       folder.write("basin.kdx", text.substr(0, text.find("    [PARAMETER_1]\n      Mean_Value")) +

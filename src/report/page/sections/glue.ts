@@ -1,5 +1,5 @@
 // What GLUE has found: which sets are acceptable, how they are weighed, and what they say of each parameter.
-import { axis, chart, legend, tip, tooltip, type ChartPlan } from '../chart';
+import { axis, chart, legend, lineEntries, tip, tooltip, type AxisPlan, type ChartPlan } from '../chart';
 import { type Glue, type ReportData } from '../data';
 import { count, number, percent } from '../format';
 import { logRange } from '../ticks';
@@ -7,6 +7,12 @@ import { grid, heading, paragraph, type Section } from './section';
 import { type CustomApi } from './uncertainty';
 
 type GlueParameter = Glue['parameters'][number];
+
+// Of an axis that ends where the values do: no label there, where it would not be a round one.
+function withoutEnds({ logarithmic, edges }: GlueParameter): AxisPlan {
+  const plan = logarithmic ? logRange([edges]) : {};
+  return { ...plan, axisLabel: { ...(plan.axisLabel as object | undefined), showMinLabel: false, showMaxLabel: false } };
+}
 
 // The weight, in dots, of sets with their values of a parameter.
 function dotPlan(glue: Glue, parameter: GlueParameter): ChartPlan {
@@ -17,7 +23,7 @@ function dotPlan(glue: Glue, parameter: GlueParameter): ChartPlan {
     zoom: 'xy',
     option: (look) => ({
       grid: { left: 16, right: 14, top: 12, bottom: 16 },
-      xAxis: axis(look, { splitNumber: 4, ...(parameter.logarithmic ? logRange([parameter.edges]) : {}), min: parameter.edges[0], max: parameter.edges[parameter.edges.length - 1] }),
+      xAxis: axis(look, { splitNumber: 4, ...withoutEnds(parameter), min: parameter.edges[0], max: parameter.edges[parameter.edges.length - 1] }),
       yAxis: axis(look, { scale: false, splitNumber: 3 }),
       tooltip: tooltip(look, { formatter: (dot: { dataIndex: number }) => tip(`Evaluation ${count(glue.numbers[dot.dataIndex]!)}`, [
         [parameter.name, number(parameter.values[dot.dataIndex], 6)], ['weight', number(glue.weights[dot.dataIndex])],
@@ -43,9 +49,9 @@ function comparisonPlan(parameter: GlueParameter): ChartPlan {
     height: 220,
     small: true,
     option: (look) => ({
-      legend: legend(look, { data: ['behavioural', 'all sets'], itemWidth: 22 }),
+      legend: legend(look, { data: ['behavioural', ...lineEntries(['all sets'])], itemWidth: 22 }),
       grid: { left: 16, right: 14, top: 34, bottom: 16 },
-      xAxis: axis(look, { splitNumber: 4, splitLine: { show: false }, ...(parameter.logarithmic ? logRange([edges]) : {}), min: edges[0], max: edges[edges.length - 1] }),
+      xAxis: axis(look, { splitNumber: 4, splitLine: { show: false }, ...withoutEnds(parameter), min: edges[0], max: edges[edges.length - 1] }),
       yAxis: axis(look, { scale: false, splitNumber: 3 }),
       tooltip: tooltip(look, { formatter: (bar: { dataIndex: number }) =>
         tip(bounds(bar.dataIndex), [['of the weight', percent(weighed[bar.dataIndex])], ['of all sets', percent(drawn[bar.dataIndex])]]) }),

@@ -119,7 +119,7 @@ function scatterPlan(screening: Screening): ChartPlan {
       } }),
       series: [
         {
-          type: 'custom', clip: true, encode: { x: 0, y: 1 },
+          type: 'custom', clip: true, encode: { x: [0, 2, 3], y: [1, 4, 5] },
           data: shown.map(({ muStar, sigma }) => [muStar[0], sigma[0], muStar[1] ?? muStar[0], muStar[2] ?? muStar[0], sigma[1] ?? sigma[0], sigma[2] ?? sigma[0]]),
           renderItem: (info: { dataIndex: number }, api: CustomApi) => {
             const color = shown[info.dataIndex]?.verdict === 'fix' ? look.dots : look.best;

@@ -29,7 +29,7 @@ function indexPlan(found: SampleSensitivity, output: number): ChartPlan {
     height: 70 + 26 * shown.length,
     option: (look) => ({
       grid: { left: 24, right: 24, top: 4, bottom: 16 },
-      xAxis: axis(look, { min: Math.min(0, ...extent), max: Math.max(0.1, ...extent) }),
+      xAxis: axis(look, { min: Math.min(0, ...extent), max: Math.max(0.1, ...extent), axisLabel: { showMinLabel: false, showMaxLabel: false } }),
       yAxis: axis(look, { type: 'category', data: shown.map((place) => found.parameters[place]!), inverse: true, axisTick: { show: false },
         axisLabel: { color: look.ink, formatter: (name: string) => shorten(name, 24), interval: 0 } }),
       tooltip: tooltip(look, { formatter: (item: { value: number[] }) => {

@@ -47,7 +47,7 @@ function histogramPlan(name: string, values: Maybe[], wantsLog = false, distribu
           return { type: 'rect', shape: { x: left!, y: top!, width: Math.max(1, right! - left! - 1), height: bottom! - top! }, style: { fill: look.bars } };
         },
       }, ...(distribution ? [{
-        type: 'line', symbol: 'none', color: look.best, lineStyle: { color: look.best, width: 2 },
+        type: 'line', symbol: 'none', color: look.initial, lineStyle: { color: look.initial, width: 2 },
         data: bins.map((bin, index) => [middle(bin), wanted[index]]),
       }] : [])],
     }),
@@ -143,7 +143,7 @@ function bandPlan(band: Band, period: [number, number] | null): ChartPlan {
   const alone = observed.filter((_, index) => !isGap(index) && isGap(index - 1) && isGap(index + 1));
   const few = finite(band.observed).length <= kFewValues;
   return {
-    title: 'The 5 to 95 % band of the simulated values, and the observed',
+    title: band.isTotal ? 'The 5 to 95 % band of what would be observed, with the errors' : 'The 5 to 95 % band of the simulated values, and the observed',
     note: `${coverageNote(band)}${runsNote(band)}${band.thinned ? ' Of so many times the extremes of short spans are drawn.' : ''}${outside(times, period).length > 0 ? ' Shaded: outside the evaluation period.' : ''} Drag across the chart to zoom in.`,
     height: 440,
     zoom: 'x',
@@ -204,11 +204,12 @@ export function bandSection(data: ReportData): Section | null {
   const shown = data.band.filter(({ p5, p95 }) => finite(p5).length > 0 && finite(p95).length > 0);
   if (shown.length === 0) return null;
   const period = data.run.period?.map((time) => Date.parse(`${time.replace(' ', 'T')}Z`)) as [number, number] | undefined ?? null;
-  return { id: 'band', title: 'Uncertainty band', content: shown.flatMap((band) => [heading(band.measure), chart(bandPlan(band, period))]) };
+  return { id: 'band', title: 'Uncertainty band', content: shown.flatMap((band) => [band.isTotal ? null : heading(band.measure), chart(bandPlan(band, period))]) };
 }
 
 export function distributionSection(data: ReportData): Section | null {
-  const inputs = variableParameters(data).map(({ name, transformation }, index) =>
+  // The sets that chains try are not distributed as the posterior, which has a section of its own.
+  const inputs = data.posterior ? [] : variableParameters(data).map(({ name, transformation }, index) =>
     chart(histogramPlan(name, data.evaluations.parameters[index] ?? [], transformation === 'logarithmic', data.distributions?.[index])));
   const outputs = judgements(data).map(({ name, values }) => chart(histogramPlan(name, values)));
   if (data.evaluations.count < 2 || inputs.length + outputs.length === 0) return null;
