@@ -244,6 +244,20 @@ TEST(Glue, OfASearchSaysThatItsSetsAreNoSampleOfTheParameters) {
   EXPECT_THAT(log, HasSubstr("\n   Parameter, behavioural "));
 }
 
+TEST(Glue, OfChainsSaysThatTheirProposalsAreNoSampleOfTheParameters) {
+  const GlueFolder folder;
+  folder.writeGlue("Behavioural_Share = 0.2");
+  folder.editSetup("'GLUE'", "'DREAM'\n[DREAM]\nLikelihood = 'normal'\n[/DREAM]");
+  ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0) << folder.read("basin.log");
+  for (const char* ending : {".dat", "_Restart.dat", "_Checksums.dat"}) {
+    std::filesystem::rename(folder / ("basin" + std::string(ending)), folder / ("chains" + std::string(ending)));
+  }
+  folder.writeGlue("Behavioural_Share = 0.2\nEarlier_Result_File = 'chains.dat'");
+  ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0) << folder.read("basin.log");
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr(" are those of a run of Markov chains, rejected ones among them, "));
+  EXPECT_FALSE(folder.exists("basin_SampleSensitivities.dat"));
+}
+
 TEST(Glue, RefusesSetupsThatDoNotSayWhatIsAcceptable) {
   const GlueFolder folder;
   const std::pair<const char*, const char*> cases[] = {
