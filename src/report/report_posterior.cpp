@@ -110,8 +110,10 @@ std::optional<ChainStates> readStates(std::string_view text) {
     for (std::size_t k = 0; k < row.size(); ++k) row[k] = realCell(cells[k]).value_or(kNaN);
     // Chain after chain, generation after generation.
     if (row[kGeneration] == 1.0) states.chainCount = rows + 1;
-    const bool isNext = states.chainCount > 0 && row[kChain] == static_cast<double>(rows % states.chainCount + 1) &&
-                        row[kGeneration] == static_cast<double>(rows / states.chainCount + 1);
+    const std::size_t generation = states.chainCount == 0 ? 0 : rows / states.chainCount;
+    const std::size_t chain = states.chainCount == 0 ? 0 : rows % states.chainCount;
+    const bool isNext = states.chainCount > 0 && row[kChain] == static_cast<double>(chain + 1) &&
+                        row[kGeneration] == static_cast<double>(generation + 1);
     states.isCutOff = !isNext;
     if (!isNext) break;
     for (std::size_t k = 0; k < row.size(); ++k) states.columns[k].push_back(row[k]);
@@ -366,6 +368,7 @@ void writePosterior(JsonWriter& json, const ReportedPosterior& posterior) {
   const std::vector<DimensionFigures> figures = figuresOf(posterior);
   const ConvergenceWords words = convergenceWords(figures, posterior.limits);
   std::vector<std::string> names;
+  names.reserve(figures.size());
   for (const DimensionFigures& one : figures) names.push_back(one.name);
   static constexpr const char* kStates[] = {"reached", "fewDraws", "apart"};
   json.key("posterior").beginObject();
