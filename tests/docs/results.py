@@ -25,6 +25,10 @@ assert str(band.index.dtype) == "datetime64[ns]" and (band["5 %"] <= band["95 %"
 assert set(sensitivity.Kind) == {"measure", "objective", "observations"} and sensitivity.Composite.dtype == float
 assert set(screening.Parameter) == {"delay", "loss"} and (screening.MuStarLower <= screening.MuStarUpper).all()
 assert screening.MuStar.dtype == float and (screening.Certainty <= 1).all() and list(screening.Effects) == [30] * 4
+assert len(indices) == 2 * (3 * 2 + 2) and (indices.Lower <= indices.Upper).all() and set(indices.Blocks) == {32}
+assert set(convergence.Rows) == {32} and convergence.Index.dtype == float
+assert len(over_time) == 730 and (over_time["ST delay"] <= over_time["ST delay upper"]).sum() > 600
+assert abs(weights.Weight.sum() - 1) < 1e-12 and set(weights.Behavioural) == {0, 1} and weights.delay.dtype == float
 for matrix in (covariance, correlation, drawn):
     assert list(matrix.index) == list(matrix.columns) == ["delay", "loss"] and (matrix.dtypes == float).all()
 assert abs(covariance.loc["delay", "loss"] - covariance.loc["loss", "delay"]) < 1e-15

@@ -1,5 +1,5 @@
 # Makes what docs/results.md reads beside the runs of the tutorial: several scenarios, with names that a reader of tables
-# could misread, a screening, and an analysis of which some evaluations fail.
+# could misread, a screening, Sobol' indices, GLUE, and an analysis of which some evaluations fail.
 scenario() { printf '[SCENARIO_%s]\nName = "%s"\nParameters = %s\n[/SCENARIO_%s]\n' "$1" "$2" "$3" "$1"; }
 runs="[SCENARIO_RUNS]
 TqSEKdxListItemCount = 3
@@ -13,6 +13,10 @@ awk -v runs="$runs" '
 Mirevo scenarios.kdx || exit 1
 sed "s/Sensitivity_Type .*/Sensitivity_Type = 'Morris'/" sensitivity.kdx >morris.kdx
 Mirevo morris.kdx || exit 1
+sed "s/Sensitivity_Type .*/Sensitivity_Type = 'Sobol'\n[SOBOL]\nSample_Size = 32\n[\/SOBOL]/" sensitivity.kdx >sobol.kdx
+Mirevo sobol.kdx || exit 1
+sed "s/Uncertainty_Type .*/Uncertainty_Type = 'GLUE'\n[GLUE]\nBehavioural_Share = 0.5\n[\/GLUE]/" uncertainty.kdx >glue.kdx
+Mirevo glue.kdx || exit 1
 cp -R model fails
 sed -i "s/^awk/awk '\$1 == \"loss\" \&\& \$3 > 0.4535 { print \"too dry # again\"; exit 3 }' parameters.txt\nawk/" fails/run.sh
 sed "s,'model/,'fails/," uncertainty.kdx >failing.kdx
