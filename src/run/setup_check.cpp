@@ -22,6 +22,7 @@
 #include "platform/signals/signal_state.h"
 #include "platform/terminal/front_end.h"
 #include "run/check_text.h"
+#include "run/results/earlier_sample_file.h"
 #include "run/run_model.h"
 #include "run/setup/setup_reader.h"
 #include "run/signal_handlers.h"
@@ -48,6 +49,7 @@ class SetupCheck final {
     print(record);
   }
   void runModel();
+  void checkEarlierResults(const SearchSpace& space, std::span<const ObservedSeries> observed);
   /// Throws FatalError if the run yields no result.
   void judgeRun(ModelRunner& runner, ProcessLauncher& launcher, std::span<const double> set);
   static EvaluationResult resultOf(ModelRunner& runner, ProcessLauncher& launcher, std::span<const double> set);
@@ -78,7 +80,12 @@ void SetupCheck::run(const std::string& setupFileName) {
 void SetupCheck::runModel() {
   ParameterModel parameters(config_.parameters, config_.constraints);
   ObjectiveAggregator aggregator(config_.objectives, config_.aggregationMethod);
-  if (config_.task) config_.task->requireSets(parameters.searchSpace(), parameters.feasibility());
+  if (config_.task) {
+    config_.task->requireSets(parameters.searchSpace(), parameters.feasibility());
+    for (const std::string& text : config_.task->setDoubts(parameters.searchSpace(), parameters.feasibility())) {
+      log_.warning(text);
+    }
+  }
   PosixProcessLauncher launcher;
   signalState.haltProcesses = haltProcessesFromSignal;
   config_.measures = withItemNumbers(config_.measures);
@@ -101,6 +108,16 @@ void SetupCheck::runModel() {
     fatalError(error.message(), error.detail().empty() ? kept : error.detail() + "\n" + kept);
   }
   removeTree(folder);  // while it is still locked
+  checkEarlierResults(parameters.searchSpace(), runner.output().observedSeries());
+}
+
+/// Of a task that judges the evaluations of an earlier run.
+void SetupCheck::checkEarlierResults(const SearchSpace& space, std::span<const ObservedSeries> observed) {
+  const std::string file = config_.task ? config_.task->earlierResultFile() : std::string();
+  if (file.empty()) return;
+  const EarlierSample earlier = readEarlierSample(file, config_, space, observed);
+  for (const std::string& text : earlier.notes) print(text);
+  for (const std::string& text : earlier.warnings) log_.warning(text);
 }
 
 void SetupCheck::judgeRun(ModelRunner& runner, ProcessLauncher& launcher, std::span<const double> set) {

@@ -156,6 +156,16 @@ TEST(Glue, OfTheFilesOfAnEarlierRunNeedsNoModelRun) {
   const std::string found = folder.found();
   renameResults(folder, "first");
   const std::string keptResults = folder.read("first.dat");
+  folder.writeGlue(
+      "Behavioural_Share = 0.5\nLikelihood = 'equal'\nShape_Factor = 2\nSampling = 'Sobol'\n"
+      "Earlier_Result_File = 'first.dat'\n[/GLUE]\nRedraw_Infeasible = 1\n[OTHER]");
+  folder.editSetup("\n[OTHER]\n    [/GLUE]", "");
+  const ProgramResult check = runProgram({"--check", folder / "basin.kdx"});
+  EXPECT_EQ(check.exitCode, 0) << check.error;
+  EXPECT_THAT(check.output, AllOf(HasSubstr("Shape_Factor: has no effect with Likelihood = 'equal'"),
+                                  HasSubstr("Sampling: has no effect with Earlier_Result_File"),
+                                  HasSubstr("Redraw_Infeasible: has no effect with Earlier_Result_File"),
+                                  HasSubstr("\n40 evaluations are taken from ")));
   const std::string values = folder.read("first_Simulated.bin");
   folder.useScript("exit 1");
   folder.writeGlue(keywords + "\nEarlier_Result_File = 'first.dat'");
@@ -177,6 +187,11 @@ TEST(Glue, OfTheFilesOfAnEarlierRunNeedsNoModelRun) {
     const ProgramResult again = runProgram({folder / "basin.kdx"});
     EXPECT_EQ(again.exitCode, 1);
     EXPECT_THAT(again.error, HasSubstr(detail));
+    folder.useScript("");
+    const ProgramResult checked = runProgram({"--check", folder / "basin.kdx"});
+    EXPECT_EQ(checked.exitCode, 1);
+    EXPECT_THAT(checked.error, HasSubstr(detail));
+    folder.useScript("exit 1");
   };
   folder.editSetup("Statistic_Type = 1", "Statistic_Type = 'NSE'");
   folder.editSetup("Behavioural_Threshold = 2", "Behavioural_Threshold = 0.5");

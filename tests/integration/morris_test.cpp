@@ -165,10 +165,21 @@ TEST_F(Morris, RefusesAndWarnsOfDesignsThatCannotServe) {
     EXPECT_EQ(run.exitCode, 1);
     EXPECT_THAT(run.error + log(), AllOf(HasSubstr(message), HasSubstr("basin.kdx:"))) << keywords;
   }
-  writeSetup("Trajectories = 4");
+  writeSetup("Trajectories = 4\nLevels = 6\nCandidate_Designs = 5000");
   ASSERT_EQ(runProgram({setup_}).exitCode, 0);
-  EXPECT_THAT(log(), AllOf(HasSubstr("Trajectories = 4: too few for limits"),
+  EXPECT_THAT(log(), AllOf(HasSubstr("Levels: has no effect without Design = 'trajectories'"),
+                           HasSubstr("Candidate_Designs: has no effect without Design = 'trajectories'"),
+                           HasSubstr("Distributions: PARAMETER_n of SENSITIVITY_ANALYSIS"),
+                           HasSubstr("Sets outside the bounds of a parameter: 0 of "),
+                           HasSubstr("Trajectories = 4: too few for limits"),
                            HasSubstr("Which parameters can be fixed is not said: that takes 5 effects of each")));
+
+  // What is computed of the effects needs no further model run.
+  folder_.editSetup("Levels = 6", "Levels = 6\nBootstrap_Samples = 200\nNegligible_Share = 0.2");
+  folder_.editSetup("Restart = 0", "Restart = 1");
+  const ProgramResult again = runProgram({setup_});
+  EXPECT_EQ(again.exitCode, 0) << again.error;
+  EXPECT_THAT(log(), HasSubstr("\n12 of them were taken from the earlier run\n"));
 }
 
 }  // namespace

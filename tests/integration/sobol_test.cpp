@@ -182,6 +182,8 @@ TEST(SobolRun, AreRefusedWithTheReason) {
   const std::pair<const char*, const char*> cases[] = {
       {"Sample_Size = 16", "Error: Sample size in Sobol sensitivity analysis invalid"},
       {"Sample_Size = 64\nGroup = 'both: a, d'", "there is no variable parameter \"d\""},
+      {"Sample_Size = 64\nBootstrap_Samples = 0", "Bootstrap_Samples: expected 100 to 100000, found 0"},
+      {"Sample_Size = 64\nNegligible_Index = 5", "Negligible_Index: expected greater than 0 and at most 1, found 5"},
       {"Sample_Size = 2000000000", "blocks of 4 sets"},
       {"Sample_Size = 64\n[/SOBOL]\n[CORRELATIONS]\nTqSEKdxListItemCount = 1\n[PAIR_1]\nFirst_Parameter = 'a'\n"
        "Second_Parameter = 'b'\nCorrelation = 0.5\n[/PAIR_1]\n[/CORRELATIONS]",
@@ -189,10 +191,50 @@ TEST(SobolRun, AreRefusedWithTheReason) {
   };
   for (const auto& [keywords, expected] : cases) {
     const ModelFolder folder;
-    const ProgramResult run = runProgram({sobolSetup(folder, keywords)});
-    EXPECT_EQ(run.exitCode, 1);
-    EXPECT_THAT(run.error, HasSubstr(expected));
+    const std::string setup = sobolSetup(folder, keywords);
+    for (const std::vector<std::string>& arguments : {std::vector{setup}, {"--check", setup}}) {
+      const ProgramResult run = runProgram(arguments);
+      EXPECT_EQ(run.exitCode, 1);
+      EXPECT_THAT(run.error, AllOf(HasSubstr(expected), HasSubstr("basin.kdx:")));
+    }
   }
+}
+
+TEST(SobolRun, SaysHowItsDistributionsAndConstraintsFitToTheBounds) {
+  const ModelFolder folder;
+  const std::string setup = sobolSetup(
+      folder,
+      "Sample_Size = 32\nSeries_Indices = 'none'\n[/SOBOL]\n[PARAMETER_1]\nMean_Value = 1210\nStandard_Deviation = 1\n"
+      "[/PARAMETER_1]\n[CORRELATIONS]\nCorrelation_Type = 'rank'\nTqSEKdxListItemCount = 0\n[/CORRELATIONS]");
+  ASSERT_EQ(runProgram({setup}).exitCode, 0);
+  EXPECT_THAT(folder.read("basin.log"),
+              AllOf(HasSubstr("PARAMETER_n of SENSITIVITY_ANALYSIS is that of the n-th variable parameter"),
+                    HasSubstr("\n  PARAMETER_1: a, mean 1210"), HasSubstr("Mean_Value of PARAMETER_1 (a) is 1210"),
+                    HasSubstr("\nSets outside the bounds of a parameter: 128 of 128 (a in 128)\n")));
+
+  // Half of the sets have an a that is not below 5.
+  sobolSetup(folder, "Sample_Size = 32");
+  folder.editSetup("TqSEKdxListItemCount = 0\n    [/INTERNAL_CONSTRAINTS]",
+                   "TqSEKdxListItemCount = 1\n[CONSTRAINT_1]\nLeft_Equation = 'a'\nRight_Equation = '5'\n"
+                   "Logical_Operator = 1\n[/CONSTRAINT_1]\n[/INTERNAL_CONSTRAINTS]");
+  const ProgramResult check = runProgram({"--check", setup});
+  EXPECT_THAT(check.output, AllOf(HasSubstr("sets of the design are not run"),
+                                  HasSubstr("The run will end before it is complete"), HasSubstr("Narrower bounds")));
+}
+
+TEST(SobolRun, OtherBootstrapSamplesAndLimitsTakeAllResultsOver) {
+  const std::string settings = "Sample_Size = 32\nBootstrap_Samples = 300\nNegligible_Index = 0.1";
+  const ModelFolder fresh;
+  ASSERT_EQ(runProgram({sobolSetup(fresh, settings)}).exitCode, 0);
+  const ModelFolder folder;
+  ASSERT_EQ(runProgram({sobolSetup(folder, "Sample_Size = 32")}).exitCode, 0);
+  const std::string setup = sobolSetup(folder, settings);
+  folder.editSetup("Restart = 0", "Restart = 1");
+  const ProgramResult run = runProgram({setup});
+  ASSERT_EQ(run.exitCode, 0) << run.error;
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("\n128 of them were taken from the earlier run\n"));
+  EXPECT_EQ(sobolCell(folder.read("basin_Sobol.dat"), {"objective", "fit", "a", "", "total"}, "Upper"),
+            sobolCell(fresh.read("basin_Sobol.dat"), {"objective", "fit", "a", "", "total"}, "Upper"));
 }
 
 }  // namespace

@@ -8,6 +8,7 @@
 #include <fmt/format.h>
 
 #include "algorithms/numbers/weighted_sample.h"
+#include "common/named_items.h"
 #include "common/text.h"
 
 namespace mirevo {
@@ -45,16 +46,32 @@ GlueJudge judgeOf(const ObjectiveFunction& objective, std::size_t index) {
           .description = fmt::format("objective function {} (small is good)", trimTrailing(objective.name))};
 }
 
-/// The measure of this name, or else the objective function.
+template <class Item>
+std::vector<std::string> namesOf(std::span<const Item> items) {
+  std::vector<std::string> names;
+  for (const Item& item : items) names.push_back(item.name);
+  return names;
+}
+
+/// The measure of this name, or else the objective function; one whose name differs by case only where no other is of
+/// exactly this name.
 std::optional<GlueJudge> judgeNamed(std::string_view name, std::span<const OutputMeasure> measures,
-                                    std::span<const ObjectiveFunction> objectives) {
-  for (std::size_t i = 0; i < measures.size(); ++i) {
-    if (equalIgnoringCase(trim(measures[i].name), name)) return judgeOf(measures[i], i);
+                                    std::span<const ObjectiveFunction> objectives, SettingRefusal& refusal) {
+  const std::vector<std::string> ofMeasures = namesOf(measures);
+  const std::vector<std::string> ofObjectives = namesOf(objectives);
+  const std::vector<std::size_t> meant = itemsNamed(name, ofMeasures);
+  const std::vector<std::size_t> others = itemsNamed(name, ofObjectives);
+  const bool isExactMeasure = !meant.empty() && isSameName(ofMeasures[meant.front()], name);
+  const bool isExactObjective = !others.empty() && isSameName(ofObjectives[others.front()], name);
+  const bool isObjective = meant.empty() || (isExactObjective && !isExactMeasure);
+  const std::vector<std::size_t>& chosen = isObjective ? others : meant;
+  if (chosen.size() > 1) {
+    refusal = {std::string(kBehaviouralRefusal), kJudgedByKeyword,
+               ambiguityText(name, isObjective ? ofObjectives : ofMeasures, chosen)};
   }
-  for (std::size_t i = 0; i < objectives.size(); ++i) {
-    if (equalIgnoringCase(trim(objectives[i].name), name)) return judgeOf(objectives[i], i);
-  }
-  return std::nullopt;
+  if (chosen.size() != 1) return std::nullopt;
+  const std::size_t i = chosen.front();
+  return isObjective ? judgeOf(objectives[i], i) : judgeOf(measures[i], i);
 }
 
 SettingRefusal unknownJudge(std::string_view name, std::span<const OutputMeasure> measures,
@@ -172,15 +189,16 @@ std::string GlueJudge::rangeText(double threshold) const {
 std::optional<GlueJudge> glueJudge(const GlueSettings& settings, std::span<const OutputMeasure> measures,
                                    std::span<const ObjectiveFunction> objectives, SettingRefusal& refusal) {
   std::optional<GlueJudge> judge;
+  refusal = {};
   if (!settings.judgedBy.empty()) {
-    judge = judgeNamed(trim(settings.judgedBy), measures, objectives);
+    judge = judgeNamed(settings.judgedBy, measures, objectives, refusal);
   } else if (measures.size() == 1 || objectives.empty()) {
     judge = judgeOf(measures.front(), 0);
   } else {
     judge = judgeOf(objectives.front(), 0);
   }
   if (!judge) {
-    refusal = unknownJudge(settings.judgedBy, measures, objectives);
+    if (refusal.message.empty()) refusal = unknownJudge(settings.judgedBy, measures, objectives);
     return std::nullopt;
   }
   if (auto unfit = misfit(*judge, settings)) {

@@ -230,10 +230,10 @@ std::vector<std::string> glueWarnings(const EvaluatedSample& sample, const GlueW
   }
   if (static_cast<double>(weighing) < kFewSets) {
     warnings.push_back(fmt::format(
-        "Only {} behavioural sets: fewer than 5 lie beyond the 5 and the 95 % quantile each, and another seed gives "
+        "Only {}: fewer than 5 lie beyond the 5 and the 95 % quantile each, and another seed gives "
         "others. Draw more sets (Sample_Size), or within narrower bounds where the behavioural values are; what is "
         "acceptable is no matter of their number",
-        weighing));
+        countText(weighing, "behavioural set")));
   } else if (weights.effective < kFewSets) {
     warnings.push_back(fmt::format(
         "The weights of {} behavioural sets tell as much as {:.1f} sets of equal weight: few sets make the quantiles. "

@@ -45,7 +45,7 @@ const SettingSection<GlueSettings>& glueSection() {
             [](GlueSettings& settings, const SetupValue& value) {
               settings.sampling = codeNamed<GlueSampling>(kGlueSamplingNames, value);
             },
-            {.name = "Sampling",
+            {.name = kSamplingKeyword,
              .defaultValue = "'Latin hypercube'",
              .codes = kGlueSamplingNames,
              .meaning = "Points of the unit cube that the distributions of the parameters make into sets: Latin "
@@ -85,7 +85,7 @@ const SettingSection<GlueSettings>& glueSection() {
              .meaning = "Likelihood of a behavioural set, before all are scaled to the sum 1; see the page on GLUE.",
              .bearsOnResults = kNotOfResults}),
         setting<&GlueSettings::shapeFactor>(
-            {.name = "Shape_Factor",
+            {.name = kShapeFactorKeyword,
              .defaultValue = "1",
              .range = kPositive,
              .refusal = kLikelihoodRefusal,

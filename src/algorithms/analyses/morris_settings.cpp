@@ -30,7 +30,7 @@ const SettingSection<MorrisSettings>& morrisSection() {
              .meaning = "From where a parameter steps: from the base point of its trajectory, which is a Sobol' point, "
                         "or from where the parameter before it has stepped to, on levels."}),
         checked<Settings>(
-            setting<&Settings::levels>({.name = "Levels",
+            setting<&Settings::levels>({.name = kLevelsKeyword,
                                         .defaultValue = "4",
                                         .range = between(2, 64),
                                         .refusal = "Error: Number of levels in Morris analysis invalid",
@@ -38,11 +38,11 @@ const SettingSection<MorrisSettings>& morrisSection() {
                                                    "number; a step goes over half of them."}),
             [](const Settings& s) -> std::optional<SettingRefusal> {
               if (s.levels % 2 == 0) return std::nullopt;
-              return SettingRefusal{"Error: Number of levels in Morris analysis invalid", "Levels",
+              return SettingRefusal{"Error: Number of levels in Morris analysis invalid", kLevelsKeyword,
                                     fmt::format("expected an even number, found {}", s.levels)};
             }),
         setting<&Settings::candidates>(
-            {.name = "Candidate_Designs",
+            {.name = kCandidatesKeyword,
              .defaultValue = "50",
              .range = between(1, 100000),
              .refusal = "Error: Number of candidate designs in Morris analysis invalid",
@@ -53,13 +53,15 @@ const SettingSection<MorrisSettings>& morrisSection() {
              .defaultValue = "1000",
              .range = between(100, 100000),
              .refusal = "Error: Number of bootstrap samples in Morris analysis invalid",
-             .meaning = "Resamples of the trajectories from which limits and stability are computed."}),
+             .meaning = "Resamples of the trajectories from which limits and stability are computed.",
+             .bearsOnResults = kNotOfResults}),
         setting<&Settings::negligibleShare>(
             {.name = "Negligible_Share",
              .defaultValue = "0.1",
              .range = {.lowest = 0, .highest = 1, .lowestExcluded = true},
              .refusal = "Error: Negligible share in Morris analysis invalid",
-             .meaning = "A parameter is negligible if its mu* is less than this share of the largest."})}}};
+             .meaning = "A parameter is negligible if its mu* is less than this share of the largest.",
+             .bearsOnResults = kNotOfResults})}}};
   return section;
 }
 

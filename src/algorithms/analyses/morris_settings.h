@@ -25,6 +25,8 @@ struct MorrisSettings {
 };
 
 inline constexpr std::string_view kTrajectoriesKeyword = "Trajectories";
+inline constexpr std::string_view kLevelsKeyword = "Levels";
+inline constexpr std::string_view kCandidatesKeyword = "Candidate_Designs";
 
 /// The section SENSITIVITY_ANALYSIS/MORRIS.
 const SettingSection<MorrisSettings>& morrisSection();

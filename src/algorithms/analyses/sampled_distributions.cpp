@@ -118,14 +118,14 @@ std::string shareWarning(const Distribution& distribution, const SearchSpace& sp
 
 }  // namespace
 
-std::vector<std::string> distributionLines(const ParameterDistributions& distributions, const SearchSpace& space) {
+std::vector<std::string> distributionLines(const ParameterDistributions& distributions, const SearchSpace& space,
+                                           std::string_view section) {
   bool areNormal = true;
   for (std::size_t j = 0; j < distributions.size(); ++j) {
     areNormal = areNormal && isNormalOnSearchScale(distributions[j]);
   }
-  std::vector<std::string> lines{
-      fmt::format("{}: PARAMETER_n of UNCERTAINTY_ESTIMATION is that of the n-th variable parameter",
-                  areNormal ? "Normal distributions" : "Distributions")};
+  std::vector<std::string> lines{fmt::format("{}: PARAMETER_n of {} is that of the n-th variable parameter",
+                                             areNormal ? "Normal distributions" : "Distributions", section)};
   for (std::size_t j = 0; j < distributions.size(); ++j) {
     lines.push_back(distributionLine(distributions[j], space, j));
     if (!isInteger(space, j) || !isNormalOnSearchScale(distributions[j])) continue;
@@ -137,8 +137,9 @@ std::vector<std::string> distributionLines(const ParameterDistributions& distrib
   lines.emplace_back("  Correlations of the normal scores:");
   for (const auto& [i, j] : largestEntries(correlations)) {
     if (correlations[i][j] == 0.0) break;
-    lines.back() += fmt::format("{} {} and {} {:.4g}", lines.back().ends_with(':') ? "" : ",", space.names[i],
-                                space.names[j], correlations[i][j]);
+    lines.back() +=
+        fmt::format("{} {} and {} {:.4g} (of the ranks {:.4g})", lines.back().ends_with(':') ? "" : ",", space.names[i],
+                    space.names[j], correlations[i][j], rankCorrelationOf(correlations[i][j]));
   }
   return lines;
 }
@@ -155,26 +156,32 @@ std::vector<std::string> distributionWarnings(const ParameterDistributions& dist
   return warnings;
 }
 
-std::string setsOutsideBounds(std::span<const ParameterSet> sample, const SearchSpace& space) {
-  std::vector<std::size_t> counts(space.size());
-  std::size_t outside = 0;
-  for (const ParameterSet& set : sample) {
-    bool isInside = true;
-    for (std::size_t j = 0; j < set.size(); ++j) {
-      if (isWithinBounds(space, j, set[j])) continue;
-      isInside = false;
-      ++counts[j];
-    }
-    outside += isInside ? 0 : 1;
+void BoundsCount::add(std::span<const double> set) {
+  bool isInside = true;
+  for (std::size_t j = 0; j < set.size(); ++j) {
+    if (isWithinBounds(space_, j, set[j])) continue;
+    isInside = false;
+    ++ofParameters_[j];
   }
-  std::string line = fmt::format("Sets outside the bounds of a parameter: {} of {}", outside, sample.size());
+  outside_ += isInside ? 0 : 1;
+  ++sets_;
+}
+
+std::string BoundsCount::line() const {
+  std::string line = fmt::format("Sets outside the bounds of a parameter: {} of {}", outside_, sets_);
   std::string_view separator = " (";
-  for (std::size_t j = 0; j < counts.size(); ++j) {
-    if (counts[j] == 0) continue;
-    line += fmt::format("{}{} in {}", separator, space.names[j], counts[j]);
+  for (std::size_t j = 0; j < ofParameters_.size(); ++j) {
+    if (ofParameters_[j] == 0) continue;
+    line += fmt::format("{}{} in {}", separator, space_.names[j], ofParameters_[j]);
     separator = ", ";
   }
-  return outside > 0 ? line + ")" : line;
+  return outside_ > 0 ? line + ")" : line;
+}
+
+std::string setsOutsideBounds(std::span<const ParameterSet> sample, const SearchSpace& space) {
+  BoundsCount count(space);
+  for (const ParameterSet& set : sample) count.add(set);
+  return count.line();
 }
 
 }  // namespace mirevo

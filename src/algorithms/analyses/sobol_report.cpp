@@ -61,6 +61,20 @@ std::vector<std::string> pairNames(const SobolFindings& findings) {
   return names;
 }
 
+/// Whether the values vary, and not by so much or so little that the squares of differences leave the range of numbers.
+bool hasVariance(const SobolIndices& indices) {
+  return std::isfinite(indices.variance) && indices.variance > 0.0 && std::isfinite(indices.mean);
+}
+
+/// Empty where there are indices.
+std::string whyNoIndices(const SobolIndices& indices) {
+  if (indices.valueCount < 2) return "no indices, too few runs succeeded";
+  if (indices.isConstant) return "no parameter has an influence, all runs have the same value";
+  if (hasVariance(indices)) return "";
+  return "no indices, the variance of its values is not a finite number: they are as large as 1e150, or as small as "
+         "1e-150";
+}
+
 bool isShown(const SobolFindings& findings, const SobolOutput& output) {
   const auto isObjective = [](const SobolOutput& one) { return one.kind == "objective"; };
   return isObjective(output) || std::ranges::none_of(findings.outputs, isObjective);
@@ -125,6 +139,7 @@ void appendFixable(const SobolFindings& findings, const SobolOutput& output, std
 
 void appendInteractions(const SobolFindings& findings, const SobolOutput& output, std::vector<std::string>& lines) {
   const SobolIndices& indices = output.indices;
+  if (findings.factors.size() < 2) return;
   if (!std::isnan(indices.sumOfFirst.value)) {
     lines.push_back(fmt::format(
         "   By themselves the parameters explain {} ({}) of the variance; interactions explain what is missing to 1",
@@ -266,10 +281,8 @@ std::vector<std::string> formatSobol(const SobolFindings& findings, std::string_
     if (!isShown(findings, output)) continue;
     const SobolIndices& indices = output.indices;
     lines.emplace_back();
-    if (indices.isConstant || indices.valueCount < 2) {
-      lines.push_back(fmt::format("{} {}: {}", kindText(output), output.name,
-                                  indices.isConstant ? "no parameter has an influence, all runs have the same value"
-                                                     : "no indices, too few runs succeeded"));
+    if (const std::string none = whyNoIndices(indices); !none.empty()) {
+      lines.push_back(fmt::format("{} {}: {}", kindText(output), output.name, none));
       continue;
     }
     lines.push_back(fmt::format("{} {}: mean {:.6g}, standard deviation {:.6g}; indices with limits of 95 %",
@@ -287,6 +300,12 @@ std::vector<std::string> formatSobol(const SobolFindings& findings, std::string_
 
 std::vector<std::string> sobolWarnings(const SobolFindings& findings) {
   std::vector<std::string> warnings;
+  for (const SobolOutput& output : findings.outputs) {
+    const SobolIndices& indices = output.indices;
+    if (indices.valueCount < 2 || indices.isConstant || hasVariance(indices)) continue;
+    warnings.push_back(fmt::format("{} {}: {}. A run that yields such values should fail, or have bounds that avoid it",
+                                   kindText(output), output.name, whyNoIndices(indices)));
+  }
   double most = 0.0;
   std::string name;
   for (const SobolOutput& output : findings.outputs) {

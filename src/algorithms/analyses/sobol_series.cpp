@@ -15,7 +15,7 @@ namespace {
 
 /// Enough for a limit that is drawn; a long series has thousands of times.
 constexpr std::size_t kSeriesBootstrapSamples = 200;
-constexpr std::size_t kValuesAtOnce = std::size_t{1} << 22;  // 32 MB
+constexpr std::size_t kValuesAtOnce = std::size_t{1} << 23;  // 64 MB; each time costs a walk through all runs
 
 std::string cell(double value) {
   return std::isfinite(value) ? fmt::format("{}", static_cast<float>(value)) : "NaN";

@@ -5,11 +5,14 @@
 
 #include <fmt/format.h>
 
+#include "common/named_items.h"
 #include "common/text.h"
 
 namespace mirevo {
 namespace {
 
+constexpr std::string_view kBootstrapRefusal =
+    "Error: Number of bootstrap samples in Sobol sensitivity analysis invalid";
 constexpr std::int32_t kLeastSampleSize = 2 * static_cast<std::int32_t>(kSobolReplicates);
 
 /// Adds the group that `text` describes, or returns why it does not.
@@ -25,14 +28,18 @@ std::string takeGroup(std::span<const std::string> parameters, std::string_view 
   if (std::ranges::any_of(groups, isSameName)) return fmt::format("there are two groups '{}'", group.name);
   for (const std::string_view part : splitAt(parts[1], ',')) {
     const std::string name(trim(part));
-    const auto found = std::ranges::find_if(
-        parameters, [&name](const std::string& one) { return equalIgnoringCase(trimTrailing(one), name); });
-    if (found == parameters.end()) {
+    if (name.empty()) {
+      return fmt::format("expected names of parameters behind ':', between commas, found none in {}",
+                         quotedForMessage(text));
+    }
+    const std::vector<std::size_t> meant = itemsNamed(name, parameters);
+    if (meant.empty()) {
       const auto nearest = nearestName(name, parameters);
       return fmt::format("there is no variable parameter {}{}", quotedForMessage(name),
                          nearest ? fmt::format("; did you mean '{}'?", *nearest) : "");
     }
-    const auto index = static_cast<std::size_t>(found - parameters.begin());
+    if (meant.size() > 1) return ambiguityText(name, parameters, meant);
+    const std::size_t index = meant.front();
     if (groupOf[index]) return fmt::format("parameter '{}' is in a group twice", name);
     groupOf[index] = groups.size();
     group.parameters.push_back(index);
@@ -80,24 +87,29 @@ const SettingSection<SobolSettings>& sobolSection() {
         setting<&Settings::bootstrapSamples>({.name = "Bootstrap_Samples",
                                               .defaultValue = "1000",
                                               .range = between(100, 100000),
-                                              .meaning = "Bootstrap samples for the limits of the indices."}),
+                                              .refusal = kBootstrapRefusal,
+                                              .meaning = "Bootstrap samples for the limits of the indices.",
+                                              .bearsOnResults = kNotOfResults}),
         setting<&Settings::negligibleIndex>(
             {.name = "Negligible_Index",
              .defaultValue = "0.05",
              .range = {.lowest = 0, .highest = 1, .lowestExcluded = true},
+             .refusal = "Error: Negligible index in Sobol sensitivity analysis invalid",
              .meaning = "A parameter can be fixed if the upper limit of its total index is below this share of the "
-                        "variance."})}}};
+                        "variance.",
+             .bearsOnResults = kNotOfResults})}}};
   return section;
 }
 
 std::vector<SobolFactor> sobolFactors(std::span<const std::string> parameters, std::span<const std::string> groups,
-                                      std::string& problem) {
+                                      SobolGroupProblem& problem) {
   std::vector<std::optional<std::size_t>> groupOf(parameters.size());
   std::vector<SobolFactor> grouped;
-  for (const std::string& text : groups) {
-    problem = takeGroup(parameters, text, groupOf, grouped);
-    if (!problem.empty()) return {};
+  for (std::size_t g = 0; g < groups.size(); ++g) {
+    problem = {takeGroup(parameters, groups[g], groupOf, grouped), g};
+    if (!problem.text.empty()) return {};
   }
+  const std::vector<SobolFactor> named = grouped;  // in the order of their lines
   std::vector<SobolFactor> factors;
   for (std::size_t j = 0; j < parameters.size(); ++j) {
     if (!groupOf[j]) {
@@ -111,7 +123,9 @@ std::vector<SobolFactor> sobolFactors(std::span<const std::string> parameters, s
   };
   const auto twice = std::ranges::find_if(factors, hasNameOf);
   if (twice == factors.end()) return factors;
-  problem = fmt::format("group '{}' has the name of a parameter that is not in it", twice->name);
+  const auto isIt = [&](const SobolFactor& one) { return one.name == twice->name; };
+  problem = {fmt::format("group '{}' has the name of a parameter that is not in it", twice->name),
+             static_cast<std::size_t>(std::ranges::find_if(named, isIt) - named.begin())};
   return {};
 }
 

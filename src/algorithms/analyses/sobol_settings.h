@@ -32,9 +32,15 @@ inline constexpr std::string_view kSobolGroupKeyword = "Group";
 /// The section SENSITIVITY_ANALYSIS/SOBOL.
 const SettingSection<SobolSettings>& sobolSection();
 
+/// Why a group is none.
+struct SobolGroupProblem {
+  std::string text;       ///< empty: all are groups
+  std::size_t group = 0;  ///< 0-based, which of them
+};
+
 /// The factors of the analysis, in the order of their first parameters: each group as one, every parameter that is in
 /// none by itself. Empty, with the reason in `problem`, where a group is none.
 std::vector<SobolFactor> sobolFactors(std::span<const std::string> parameters, std::span<const std::string> groups,
-                                      std::string& problem);
+                                      SobolGroupProblem& problem);
 
 }  // namespace mirevo

@@ -87,7 +87,7 @@ const SettingSection<UncertaintySection>& uncertaintySection() {
             {.name = "Random_Seed", .defaultValue = "1", .meaning = "Seed of the run; its sign does not matter."}),
         setting<UncertaintySection>(
             [](auto& s) -> auto& { return s.settings.redrawsInfeasible; },
-            {.name = "Redraw_Infeasible",
+            {.name = kRedrawKeyword,
              .defaultValue = "0",
              .meaning =
                  "1: sets that violate a constraint, or for which an equation has no finite value, are drawn again "
@@ -111,10 +111,9 @@ const SettingSection<UncertaintySection>& uncertaintySection() {
             [](auto& s) -> auto& { return s.settings.matrixLimit; },
             {.name = "Correlation_Matrix_Limit",
              .defaultValue = "1000",
-             .range = from(0),
              .unit = "parameters",
              .meaning = "Number of variable parameters up to which `<setup>_SampleCorrelation.dat` has the matrix of "
-                        "all correlations. Of more parameters it has the 10,000 largest alone."})}}};
+                        "all correlations. Of more parameters it has the 10,000 largest alone; 0 or less: always."})}}};
   return section;
 }
 

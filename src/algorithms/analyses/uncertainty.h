@@ -45,6 +45,7 @@ struct UncertaintySettings {
 
 inline constexpr std::string_view kUncertaintySection = "UNCERTAINTY_ESTIMATION";
 inline constexpr std::string_view kUncertaintyTypeKeyword = "Uncertainty_Type";
+inline constexpr std::string_view kRedrawKeyword = "Redraw_Infeasible";
 inline constexpr std::string_view kSampleSizeKeyword = "Sample_Size";
 inline constexpr std::string_view kBandTimesKeyword = "Band_Times";
 inline constexpr std::string_view kBandEndKeyword = "Band_End_Date";

@@ -13,6 +13,10 @@
 namespace mirevo {
 namespace {
 
+/// Below it the inverse of the matrix, and with it the density, has fewer than half of the digits of a number.
+constexpr double kLeastEigenvalue = 1.0e-8;
+constexpr double kEigenvalueError = 1.0e-6;  ///< of smallestEigenvalue()
+
 /// The Cholesky factor of R - shift I, column by column; empty if that is not positive definite.
 std::vector<double> factorOf(std::span<const std::vector<double>> correlations, double shift) {
   const std::size_t n = correlations.size();
@@ -34,20 +38,30 @@ std::string largestText(std::span<const std::vector<double>> correlations, std::
   return text;
 }
 
+[[noreturn]] void refuse(std::span<const std::vector<double>> correlations, std::span<const std::string> names) {
+  const double smallest = smallestEigenvalue(correlations);
+  const std::string largest = largestText(correlations, names);
+  if (smallest < -kEigenvalueError) {
+    fatalError("Error: Correlations of the parameters are not positive definite",
+               fmt::format("no distribution can have all of them: the smallest eigenvalue of their matrix is {:.4g}, "
+                           "expected above 0; the largest are {}\nIt would be positive if all were multiplied by a "
+                           "factor below {:.4g}; or correct those that contradict each other",
+                           smallest, largest, 1.0 / (1.0 - smallest)));
+  }
+  fatalError("Error: Correlations of the parameters are not positive definite",
+             fmt::format("with them a parameter is a function of others, but for rounding: the smallest eigenvalue of "
+                         "their matrix is 0, expected {:g} or more; the largest are {}\nMultiply all by 0.999, or make "
+                         "the parameter one with Parameter_Type = 2, whose equation has the others",
+                         kLeastEigenvalue, largest));
+}
+
 }  // namespace
 
 GaussianCopula::GaussianCopula(std::vector<std::vector<double>> correlations, std::span<const std::string> names)
     : correlations_(std::move(correlations)), isCorrelated_(correlations_.size()) {
   const std::size_t n = size();
+  if (factorOf(correlations_, kLeastEigenvalue).empty()) refuse(correlations_, names);
   const std::vector<double> factor = factorOf(correlations_, 0.0);
-  if (factor.empty()) {
-    const double smallest = smallestEigenvalue(correlations_);
-    fatalError("Error: Correlations of the parameters are not positive definite",
-               fmt::format("no distribution can have all of them: the smallest eigenvalue of their matrix is {:.4g}, "
-                           "expected above 0; the largest are {}\nIt would be positive if all were multiplied by a "
-                           "factor below {:.4g}; or correct those that contradict each other",
-                           smallest, largestText(correlations_, names), 1.0 / (1.0 - std::min(smallest, 0.0))));
-  }
   for (std::size_t i = 0; i < n; ++i) {
     for (std::size_t j = 0; j <= i; ++j) factor_.push_back(factor[j * n + i]);
     logOfRoot_ += std::log(factor_.back());
@@ -89,6 +103,10 @@ double smallestEigenvalue(std::span<const std::vector<double>> correlations) {
 
 double ofRankCorrelation(double rankCorrelation) {
   return 2.0 * std::sin(std::numbers::pi * rankCorrelation / 6.0);
+}
+
+double rankCorrelationOf(double correlation) {
+  return 6.0 / std::numbers::pi * std::asin(correlation / 2.0);
 }
 
 }  // namespace mirevo

@@ -13,7 +13,7 @@ namespace mirevo {
 class GaussianCopula final {
  public:
   /// `correlations`: R, p by p, symmetric, with 1 on the diagonal; `names` are those of its rows, for refusals. Throws
-  /// FatalError unless R is positive definite.
+  /// FatalError unless all eigenvalues of R are above 1e-8.
   GaussianCopula(std::vector<std::vector<double>> correlations, std::span<const std::string> names);
 
   std::size_t size() const { return correlations_.size(); }
@@ -40,5 +40,7 @@ double smallestEigenvalue(std::span<const std::vector<double>> correlations);
 /// The correlation of the normal scores of two quantities whose rank correlation (Spearman) is given: 2 sin(pi r / 6),
 /// Pearson (1907).
 double ofRankCorrelation(double rankCorrelation);
+/// Its inverse.
+double rankCorrelationOf(double correlation);
 
 }  // namespace mirevo

@@ -83,7 +83,7 @@ struct KeywordFacts {
   std::string_view defaultValue = {};    ///< as written in a setup; empty if the keyword is required
   ValueRange range = {};
   std::span<const CodeName> codes = {};  ///< of a coded keyword
-  /// Fixed text for a value outside the range; if it ends with a blank, the name of the item follows.
+  /// For a value outside the range, with the item's name behind a final blank; without it the check judges, if any.
   std::string_view refusal = {};
   std::string_view unit = {};
   std::string meaning = {};

@@ -22,6 +22,12 @@ std::string didYouMean(std::string_view missing, const std::vector<std::string>&
                  : std::string{};
 }
 
+/// A row with a check of its own, but no refusal, judges the value itself.
+bool isRangeChecked(const KeywordRow& row) {
+  if (!row.facts.refusal.empty()) return true;
+  return row.check == nullptr && !row.facts.range.text().empty();
+}
+
 std::string inside(std::string_view path, std::string_view name) {
   return path.empty() ? std::string(name) : fmt::format("{}/{}", path, name);
 }
@@ -348,12 +354,12 @@ void SetupSection::takeValue(const KeywordRow& row, const SetupValue& value, boo
 void SetupSection::check(const BoundSection& section) const {
   std::vector<const KeywordRow*> rows;
   for (const KeywordRow& row : section.row->keywords) {
-    if (row.store != nullptr && (!row.facts.refusal.empty() || row.check != nullptr)) rows.push_back(&row);
+    if (row.store != nullptr && (isRangeChecked(row) || row.check != nullptr)) rows.push_back(&row);
   }
   std::stable_sort(rows.begin(), rows.end(),
                    [](const KeywordRow* a, const KeywordRow* b) { return a->facts.checkOrder < b->facts.checkOrder; });
   for (const KeywordRow* row : rows) {
-    if (!row->facts.refusal.empty()) checkRange(*row, section);
+    if (isRangeChecked(*row)) checkRange(*row, section);
     if (row->check != nullptr) require(row->check(section.settings));
   }
 }
@@ -367,6 +373,10 @@ void SetupSection::checkRange(const KeywordRow& row, const BoundSection& section
   if (integer == nullptr && real == nullptr) return;  // the name of a code
   const double number = integer != nullptr ? *integer : *real;
   if (row.facts.range.contains(number)) return;
+  if (row.facts.refusal.empty()) {
+    refuseToRead(keyword->position, row.name(),
+                 fmt::format("expected {}, found {}", row.facts.range.text(), formatReal(number)));
+  }
   std::string message(row.facts.refusal);
   if (message.ends_with(' ')) {
     message += section.row->itemName != nullptr ? section.row->itemName(section.settings) : name();
@@ -413,6 +423,13 @@ SetupValue SetupSection::convert(const KeywordRow& row, const KdxKeyword& keywor
 
 void SetupSection::refuse(std::string_view message, std::string_view keyword, std::string_view explanation) const {
   fatalError(message, fmt::format("{}: {}: {}", location(keyword), keyword, explanation));
+}
+
+void SetupSection::refuse(std::string_view message, std::string_view keyword, int instance,
+                          std::string_view explanation) const {
+  const KdxKeyword* found = node_->keyword(keyword, instance);
+  const KdxPosition position = found == nullptr ? node_->position() : found->values.front().position;
+  fatalError(message, fmt::format("{}: {}: {}", file_->location(position), keyword, explanation));
 }
 
 void SetupSection::refuse(const SettingRefusal& refusal) const {

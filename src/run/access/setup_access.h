@@ -121,6 +121,9 @@ class SetupSection final {
   /// Throws FatalError with `message`; `explanation` follows the keyword's location.
   [[noreturn]] void refuse(std::string_view message, std::string_view keyword, std::string_view explanation) const;
   [[noreturn]] void refuse(const SettingRefusal& refusal) const;
+  /// The same for the n-th value, from 1, of a keyword that may be repeated.
+  [[noreturn]] void refuse(std::string_view message, std::string_view keyword, int instance,
+                           std::string_view explanation) const;
   /// Refuses if there is a refusal.
   void require(const std::optional<SettingRefusal>& refusal) const {
     if (refusal) refuse(*refusal);

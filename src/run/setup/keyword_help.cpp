@@ -84,7 +84,7 @@ std::string helpOfKeyword(const SectionRow& section, const KeywordRow& row) {
   std::string text = pathOf(section, row) + "\n" + wrapped("  Meaning:", withoutLinks(row.facts.meaning));
   text += wrapped("  Type:", keywordTypeName(row.type));
   text += wrapped("  Default:", row.isRequired() ? "required" : row.facts.defaultValue);
-  if (const std::string range = row.facts.range.text(); !range.empty()) text += wrapped("  Valid:", range);
+  if (const std::string range = validText(row); !range.empty()) text += wrapped("  Valid:", range);
   if (!row.facts.unit.empty()) text += wrapped("  Unit:", row.facts.unit);
   if (!row.facts.codes.empty()) {
     std::string codes;

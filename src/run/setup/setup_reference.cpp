@@ -1,5 +1,7 @@
 #include "run/setup/setup_reference.h"
 
+#include <algorithm>
+
 #include <fmt/core.h>
 
 #include "run/setup/run_keywords.h"
@@ -47,7 +49,7 @@ std::string keywordTableOf(const SectionRow& section) {
   std::string codes;
   for (const KeywordRow& row : section.keywords) {
     text += fmt::format("| `{}` | {} | {} | {} | {} | {} |\n", row.name(), keywordTypeName(row.type), defaultText(row),
-                        row.facts.range.text(), row.facts.unit, row.facts.meaning);
+                        validText(row), row.facts.unit, row.facts.meaning);
     const bool isFlag = row.facts.codes.data() == std::data(kNoYesNames);
     if (!row.facts.codes.empty() && !isFlag) codes += fmt::format("- `{}`: {}\n", row.name(), codesText(row));
   }
@@ -55,6 +57,12 @@ std::string keywordTableOf(const SectionRow& section) {
 }
 
 }  // namespace
+
+std::string validText(const KeywordRow& row) {
+  const std::string text = row.facts.range.text();
+  const auto hasNameOnly = [](const CodeName& code) { return !code.code.has_value(); };
+  return text.empty() || std::ranges::none_of(row.facts.codes, hasNameOnly) ? text : text + " or a name";
+}
 
 std::string_view keywordTypeName(KeywordType type) {
   switch (type) {

@@ -11,6 +11,7 @@
 #include "common/data_table.h"
 #include "common/fatal_error.h"
 #include "common/files.h"
+#include "common/named_items.h"
 #include "common/text.h"
 
 namespace mirevo {
@@ -87,15 +88,17 @@ const Sections& sections(std::string_view task) {
 
 std::size_t parameterNamed(const std::string& name, std::string_view keyword, const SetupSection& section,
                            const SearchSpace& space) {
-  const auto found = std::ranges::find_if(
-      space.names, [&](const std::string& other) { return equalIgnoringCase(other, trimTrailing(name)); });
-  if (found == space.names.end()) {
+  const std::vector<std::size_t> meant = itemsNamed(name, space.names);
+  if (meant.empty()) {
     const auto nearest = nearestName(name, space.names);
     section.refuse("Error: Unknown parameter in correlations", keyword,
                    fmt::format("expected the name of a variable parameter, found {}{}", quotedForMessage(name),
                                nearest ? fmt::format(", did you mean {}?", quotedForMessage(*nearest)) : ""));
   }
-  return static_cast<std::size_t>(found - space.names.begin());
+  if (meant.size() > 1) {
+    section.refuse("Error: Parameter in correlations ambiguous", keyword, ambiguityText(name, space.names, meant));
+  }
+  return meant.front();
 }
 
 /// Fills the matrix with the correlations of the table's parameters that are variable, and returns their number. Throws
@@ -166,12 +169,21 @@ std::optional<GaussianCopula> readCorrelations(const SetupSection& section, cons
   for (std::size_t j = 0; j < space.size(); ++j) matrix[j][j] = 1.0;
   if (!settings.file.empty()) takeFile(*given, settings.file, space, matrix);
   std::vector<CorrelatedPair> pairs;
+  std::map<std::pair<std::size_t, std::size_t>, std::pair<double, std::string>> earlierPairs;  // with its place
   given->readItems("PAIR_", rows.pair, pairs, [&](const SetupSection& item, const CorrelatedPair& pair) {
     const std::size_t i = parameterNamed(pair.first, kFirstKeyword, item, space);
     const std::size_t j = parameterNamed(pair.second, kSecondKeyword, item, space);
     if (i == j) {
       item.refuse("Error: Correlation of parameters invalid", kSecondKeyword,
                   fmt::format("expected another parameter than {}", space.names[i]));
+    }
+    const auto [earlier, isNew] =
+        earlierPairs.try_emplace(std::minmax(i, j), pair.correlation, item.location(kValueKeyword));
+    if (!isNew && earlier->second.first != pair.correlation) {
+      item.refuse(
+          "Error: Correlation of parameters given twice", kValueKeyword,
+          fmt::format("{} and {} have {} at {}, found {}: leave one of the pairs out", space.names[i], space.names[j],
+                      formatReal(earlier->second.first), earlier->second.second, formatReal(pair.correlation)));
     }
     matrix[i][j] = matrix[j][i] = pair.correlation;
   });

@@ -25,6 +25,9 @@ namespace mirevo {
 namespace {
 
 constexpr CodeName kGlueName{std::nullopt, "GLUE"};
+constexpr const char* kWhatSets = "sets of the sample";
+constexpr const char* kInfeasibleRemedy =
+    "With Redraw_Infeasible = 1 in UNCERTAINTY_ESTIMATION sets are drawn until all can be run";
 
 std::vector<double> randomPoint(std::size_t dimension, UniformGenerator& random) {
   std::vector<double> point(dimension);
@@ -84,7 +87,7 @@ void GlueTask::read(const TaskReading& reading) {
   const SetupSection own = section.open(kGlueSectionName);
   own.read(glueSection(), glue);
   if (glue.sampling == GlueSampling::sobol && reading.variableCount > kMaxSobolDimension) {
-    own.refuse("Error: Sampling in uncertainty estimation invalid", "Sampling",
+    own.refuse("Error: Sampling in uncertainty estimation invalid", kSamplingKeyword,
                fmt::format("'Sobol' is for up to {} variable parameters, found {}", kMaxSobolDimension,
                            reading.variableCount));
   }
@@ -94,6 +97,7 @@ void GlueTask::read(const TaskReading& reading) {
   judge_ = *judge;
   settings.distributions = readDistributions(reading, section);
   keepSingleValues(reading);
+  warnOfUnused(section, own);
   if (isOfEarlierRun()) {
     validateFileOpens(glue.earlierFile, kEarlierRunKeyword, own);
     refuseOwnResults(reading, own);
@@ -108,6 +112,16 @@ void GlueTask::read(const TaskReading& reading) {
                  fmt::format("Sobol points fill the space evenly where their number is a power of two: {} or {}",
                              std::bit_floor(size), std::uint64_t{std::bit_floor(size)} * 2));
   }
+}
+
+void GlueTask::warnOfUnused(const SetupSection& section, const SetupSection& own) const {
+  if (glue.likelihood == LikelihoodShape::equal && own.isWritten(kShapeFactorKeyword)) {
+    own.warn(kShapeFactorKeyword, "has no effect with Likelihood = 'equal'");
+  }
+  if (!isOfEarlierRun()) return;
+  constexpr const char* kReason = "has no effect with Earlier_Result_File, as no set is drawn";
+  if (section.isWritten(kRedrawKeyword)) section.warn(kRedrawKeyword, kReason);
+  if (own.isWritten(kSamplingKeyword)) own.warn(kSamplingKeyword, kReason);
 }
 
 /// Values that distributions have exactly, such as those of a file.
@@ -148,7 +162,7 @@ std::string GlueTask::description() const {
 
 std::vector<std::string> GlueTask::summaryLines(const SearchSpace& space) const {
   std::vector<std::string> lines;
-  if (!isOfEarlierRun()) lines = distributionLines(settings.distributions, space);
+  if (!isOfEarlierRun()) lines = distributionLines(settings.distributions, space, kUncertaintySection);
   lines.insert(lines.end(), {"GLUE, " + behaviouralText(judge_, glue), "GLUE, " + likelihoodText(glue)});
   return lines;
 }
@@ -181,14 +195,21 @@ EarlierSample GlueTask::emptySample(const TaskContext& context) const {
   return {.simulatedColumns = context.simulatedColumns, .areCorrelated = settings.distributions.copula().has_value()};
 }
 
+std::vector<std::string> GlueTask::setDoubts(const SearchSpace& /*space*/, const Feasibility& feasibility) const {
+  if (isOfEarlierRun() || settings.redrawsInfeasible || !feasibility.isTested()) return {};
+  const InfeasibleSets found =
+      infeasibleSets(feasibility, drawSample(feasibility).sets, kWhatSets, settings.sampleSize, kInfeasibleRemedy);
+  if (found.text.empty()) return {};
+  return {found.text};
+}
+
 EarlierSample GlueTask::evaluateSample(const TaskContext& context) const {
   const FeasibleSample drawn = drawSample(context.feasibility);
   if (drawn.drawnCount > std::ssize(drawn.sets)) {
     context.log.line(
         fmt::format("Redraw_Infeasible: {} sets that can be run out of {} drawn", drawn.sets.size(), drawn.drawnCount));
   } else if (!settings.redrawsInfeasible) {
-    warnOfInfeasibleSets(context, drawn.sets, "sets of the sample", settings.sampleSize,
-                         "With Redraw_Infeasible = 1 in UNCERTAINTY_ESTIMATION sets are drawn until all can be run");
+    warnOfInfeasibleSets(context, drawn.sets, kWhatSets, settings.sampleSize, kInfeasibleRemedy);
   }
   context.log.line(setsOutsideBounds(drawn.sets, context.space));
   logBandTimes(context, settings);

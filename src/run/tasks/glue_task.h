@@ -28,6 +28,8 @@ class GlueTask final : public Task {
   bool readsSimulatedValues() const override { return true; }
   std::optional<KeptSteps> keptSteps() const override;
   void requireSets(const SearchSpace& space, const Feasibility& feasibility) const override;
+  std::vector<std::string> setDoubts(const SearchSpace& space, const Feasibility& feasibility) const override;
+  std::string earlierResultFile() const override { return glue.earlierFile; }
   TaskOutcome run(const TaskContext& context) override;
   std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const override;
   TaskReport report() const override {
@@ -41,6 +43,7 @@ class GlueTask final : public Task {
  private:
   bool isOfEarlierRun() const { return !glue.earlierFile.empty(); }
   void keepSingleValues(const TaskReading& reading);
+  void warnOfUnused(const SetupSection& section, const SetupSection& own) const;
   void refuseOwnResults(const TaskReading& reading, const SetupSection& section) const;
   /// The sets and how many were drawn for them; fewer only if none are redrawn.
   FeasibleSample drawSample(const Feasibility& feasibility) const;

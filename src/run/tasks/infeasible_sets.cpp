@@ -1,5 +1,7 @@
 #include "run/tasks/infeasible_sets.h"
 
+#include <utility>
+
 #include <fmt/format.h>
 
 #include "evaluation/failed_run_policy.h"
@@ -11,20 +13,20 @@ constexpr std::size_t kMostNumbers = 20;  // in the warning
 
 }  // namespace
 
-void warnOfInfeasibleSets(const TaskContext& context, std::span<const ParameterSet> sets, std::string_view what,
-                          int planned, std::string_view remedy) {
-  if (!context.feasibility.isTested()) return;
+InfeasibleSets infeasibleSets(const Feasibility& feasibility, std::span<const ParameterSet> sets, std::string_view what,
+                              int planned, std::string_view remedy) {
+  if (!feasibility.isTested()) return {};
   std::string numbers;
   std::string first;
   std::size_t count = 0;
   for (std::size_t i = 0; i < sets.size(); ++i) {
-    const std::optional<std::string> violation = context.feasibility.violation(sets[i]);
+    const std::optional<std::string> violation = feasibility.violation(sets[i]);
     if (!violation) continue;
     if (count == 0) first = fmt::format("No. {}: {}", i + 1, *violation);
     if (count < kMostNumbers) numbers += fmt::format("{}{}", count == 0 ? "" : ", ", i + 1);
     ++count;
   }
-  if (count == 0) return;
+  if (count == 0) return {};
   if (count > kMostNumbers) numbers += fmt::format(" and {} more", count - kMostNumbers);
   std::string text =
       fmt::format("{} of {} {} {} not run and {}, as {} a constraint or an equation has no finite value: No. {}\n   {}",
@@ -41,10 +43,17 @@ void warnOfInfeasibleSets(const TaskContext& context, std::span<const ParameterS
       text.append("\n   ").append(remedy);
     }
   }
-  if (endsRun && context.warnUser) {
-    context.warnUser(text);
+  return {std::move(text), endsRun};
+}
+
+void warnOfInfeasibleSets(const TaskContext& context, std::span<const ParameterSet> sets, std::string_view what,
+                          int planned, std::string_view remedy) {
+  const InfeasibleSets found = infeasibleSets(context.feasibility, sets, what, planned, remedy);
+  if (found.text.empty()) return;
+  if (found.endsRun && context.warnUser) {
+    context.warnUser(found.text);
   } else {
-    context.log.warning(text);
+    context.log.warning(found.text);
   }
 }
 

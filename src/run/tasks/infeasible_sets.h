@@ -1,12 +1,22 @@
 #pragma once
 
 #include <span>
+#include <string>
 #include <string_view>
 
 #include "common/parameter_set.h"
 #include "run/tasks/task.h"
 
 namespace mirevo {
+
+/// What is said of sets that will be evaluated although they cannot be run.
+struct InfeasibleSets {
+  std::string text;      ///< empty: there are none
+  bool endsRun = false;  ///< more of them than may fail
+};
+/// As the following; for the user where the run will end early.
+InfeasibleSets infeasibleSets(const Feasibility& feasibility, std::span<const ParameterSet> sets, std::string_view what,
+                              int planned, std::string_view remedy = {});
 
 /// Warns, before the first model run, of sets that will be evaluated although they cannot be run, with their numbers.
 /// If more of them than may fail are among `planned` evaluations, the user is told, too. `sets` are the first

@@ -4,6 +4,7 @@
 
 #include <fmt/core.h>
 
+#include "algorithms/analyses/sampled_distributions.h"
 #include "common/fatal_error.h"
 #include "parameters/parameter_model.h"
 #include "run/tasks/analysis_names.h"
@@ -34,24 +35,39 @@ void MorrisTask::read(const TaskReading& reading) {
   const auto own = section.openIfPresent("MORRIS");
   if (own) own->read(morrisSection(), settings);
   const std::int64_t sets = std::int64_t{settings.trajectories} * static_cast<std::int64_t>(reading.variableCount + 1);
-  if (const auto tooMany = tooManySets(sets, 1)) {
+  if (const auto tooMany = tooManySets(sets)) {
     (own ? *own : section)
         .refuse("Error: Number of trajectories in Morris analysis invalid", kTrajectoriesKeyword,
-                fmt::format("{} of {} parameters are {} sets: {}", settings.trajectories, reading.variableCount, sets,
-                            *tooMany));
+                fmt::format("{}, found {} trajectories of {} sets", *tooMany, settings.trajectories,
+                            reading.variableCount + 1));
   }
+  if (own) tellOfDesign(*own);
   distributions = readDistributions(reading, section);
   ParameterModel model({reading.parameters.begin(), reading.parameters.end()},
                        {reading.constraints.begin(), reading.constraints.end()});
+  plan_.reset();
   planned_ = planIn(model.searchSpace(), model.feasibility()).evaluationCount;
+}
+
+void MorrisTask::tellOfDesign(const SetupSection& section) const {
+  constexpr std::int32_t kManyCandidates = 1000;
+  if (settings.design == EffectDesign::trajectories) {
+    if (settings.candidates < kManyCandidates) return;
+    section.note(kCandidatesKeyword, fmt::format("{} designs are compared, which takes a while", settings.candidates));
+    return;
+  }
+  for (const std::string_view keyword : {kLevelsKeyword, kCandidatesKeyword}) {
+    if (section.isWritten(keyword)) section.warn(keyword, "has no effect without Design = 'trajectories'");
+  }
 }
 
 ParameterDistributions MorrisTask::distributionsIn(const SearchSpace& space) const {
   return distributions ? *distributions : ParameterDistributions::uniform(space);
 }
 
-EffectPlan MorrisTask::planIn(const SearchSpace& space, const Feasibility& feasibility) const {
-  return planEffects(settings, space, distributionsIn(space), randomSeed, feasibility);
+const EffectPlan& MorrisTask::planIn(const SearchSpace& space, const Feasibility& feasibility) const {
+  if (!plan_) plan_ = planEffects(settings, space, distributionsIn(space), randomSeed, feasibility);
+  return *plan_;
 }
 
 std::string MorrisTask::description() const {
@@ -59,17 +75,23 @@ std::string MorrisTask::description() const {
                      settings.design == EffectDesign::radial ? "radial" : "on levels");
 }
 
-std::vector<std::string> MorrisTask::warnings(const SearchSpace& /*space*/) const {
-  if (settings.trajectories >= static_cast<std::int32_t>(kFewestEffectsForSigma)) return {};
-  return {fmt::format("{} = {}: {}", kTrajectoriesKeyword, settings.trajectories,
-                      settings.trajectories < static_cast<std::int32_t>(kFewestEffects)
-                          ? "too few for limits, and for a statement on which parameters can be fixed"
-                          : "so few that limits are wide, sigma has none, and a ranking may not hold")};
+std::vector<std::string> MorrisTask::summaryLines(const SearchSpace& space) const {
+  return distributionLines(distributionsIn(space), space, kSensitivitySection);
+}
+
+std::vector<std::string> MorrisTask::warnings(const SearchSpace& space) const {
+  std::vector<std::string> texts = distributionWarnings(distributionsIn(space), space);
+  if (settings.trajectories >= static_cast<std::int32_t>(kFewestEffectsForSigma)) return texts;
+  texts.push_back(fmt::format("{} = {}: {}", kTrajectoriesKeyword, settings.trajectories,
+                              settings.trajectories < static_cast<std::int32_t>(kFewestEffects)
+                                  ? "too few for limits, and for a statement on which parameters can be fixed"
+                                  : "so few that limits are wide, sigma has none, and a ranking may not hold"));
+  return texts;
 }
 
 void MorrisTask::requireSets(const SearchSpace& space, const Feasibility& feasibility) const {
   if (!feasibility.isTested()) return;
-  const EffectPlan plan = planIn(space, feasibility);
+  const EffectPlan& plan = planIn(space, feasibility);
   for (const EffectTrajectory& trajectory : plan.trajectories) {
     if (!pairsOf(plan, trajectory).empty()) return;
   }
@@ -90,9 +112,18 @@ TaskOutcome MorrisTask::outcomeOf(const TaskContext& context, const EffectPlan& 
 
 TaskOutcome MorrisTask::run(const TaskContext& context) {
   requireSets(context.space, context.feasibility);
-  const EffectPlan plan = planIn(context.space, context.feasibility);
+  const EffectPlan& plan = planIn(context.space, context.feasibility);
+  const ParameterDistributions drawnFrom = distributionsIn(context.space);
+  BoundsCount outside(context.space);
+  for (const EffectTrajectory& trajectory : plan.trajectories) {
+    for (const ParameterSet& set : setsOf(plan, trajectory, drawnFrom)) outside.add(set);
+  }
+  context.log.line(outside.line());
   results_.clear();
-  evaluateEffects(plan, distributionsIn(context.space), context.evaluator, results_);
+  evaluateEffects(plan, drawnFrom, context.evaluator, results_);
+  context.log.line(
+      fmt::format("The statistics of the effects and their limits, from {} bootstrap samples, are computed",
+                  settings.bootstrapSamples));
   TaskOutcome outcome = outcomeOf(context, plan, results_);
   logReport(context, outcome.report);
   return outcome;
@@ -100,7 +131,7 @@ TaskOutcome MorrisTask::run(const TaskContext& context) {
 
 std::optional<TaskOutcome> MorrisTask::unfinishedOutcome(const TaskContext& context,
                                                          const UnfinishedBatch& made) const {
-  const EffectPlan plan = planIn(context.space, context.feasibility);
+  const EffectPlan& plan = planIn(context.space, context.feasibility);
   EvaluationResult missing;
   missing.failure = {EvaluationFailure::Kind::notMade, "the run ended before", {}};
   EffectResults results = results_;

@@ -16,6 +16,7 @@ class MorrisTask final : public Task {
   std::vector<std::string> neededSections(const SetupSection& target) const override;
   void read(const TaskReading& reading) override;
   std::string description() const override;
+  std::vector<std::string> summaryLines(const SearchSpace& space) const override;
   std::vector<std::string> warnings(const SearchSpace& space) const override;
   int plannedEvaluations() const override { return planned_; }
   bool drawsRandomNumbers() const override { return true; }
@@ -31,9 +32,12 @@ class MorrisTask final : public Task {
 
  private:
   ParameterDistributions distributionsIn(const SearchSpace& space) const;
-  EffectPlan planIn(const SearchSpace& space, const Feasibility& feasibility) const;
+  void tellOfDesign(const SetupSection& section) const;
+  /// Made once, as the choice among many candidates takes long.
+  const EffectPlan& planIn(const SearchSpace& space, const Feasibility& feasibility) const;
   TaskOutcome outcomeOf(const TaskContext& context, const EffectPlan& plan, const EffectResults& results) const;
 
+  mutable std::optional<EffectPlan> plan_;
   int planned_ = 0;        ///< the sets of the setup's plan
   EffectResults results_;  ///< of the batches of the run that are complete
 };

@@ -7,6 +7,7 @@
 
 #include <fmt/format.h>
 
+#include "algorithms/analyses/sampled_distributions.h"
 #include "algorithms/analyses/sobol_indices.h"
 #include "algorithms/analyses/sobol_report.h"
 #include "algorithms/analyses/sobol_series.h"
@@ -21,6 +22,10 @@
 namespace mirevo {
 namespace {
 
+constexpr const char* kWhatSets = "sets of the design";
+constexpr const char* kInfeasibleRemedy =
+    "Narrower bounds that leave out most of what the constraints exclude make more of them run; or a parameter for the "
+    "difference or the ratio of two, from which an equation makes the other (Parameter_Type = 2)";
 constexpr const char* kSobolSizeRefusal = "Error: Sample size in Sobol sensitivity analysis invalid";
 
 /// Two correlated parameters of different factors.
@@ -103,15 +108,19 @@ std::string leadersText(const SobolSeries& series, std::span<const SobolFactor> 
 
 }  // namespace
 
-/// What is drawn from the run's random numbers, in this order.
+/// What is drawn from the run's random numbers.
 struct SobolTask::Drawn {
   UniformGenerator random;
   ReplicateBootstrap bootstrap;
 };
 
 SobolTask::Drawn SobolTask::draw() const {
+  UniformGenerator ofBootstrap(randomSeed);
+  const ReplicateBootstrap bootstrap(static_cast<std::size_t>(settings.bootstrapSamples), ofBootstrap);
+  // The numbers of the sets come behind those of the default number of bootstrap samples, whatever their number is, so
+  // that a restart with more of them has the same sets.
   UniformGenerator random(randomSeed);
-  const ReplicateBootstrap bootstrap(static_cast<std::size_t>(settings.bootstrapSamples), random);
+  ReplicateBootstrap(static_cast<std::size_t>(SobolSettings{}.bootstrapSamples), random);
   return {random, bootstrap};
 }
 
@@ -144,9 +153,12 @@ void SobolTask::read(const TaskReading& reading) {
                            kMaxSobolDimension / 2, reading.variableCount));
   }
   const SearchSpace space = BuildSearchSpace(reading.parameters);
-  std::string problem;
+  SobolGroupProblem problem;
   factors_ = sobolFactors(space.names, settings.groups, problem);
-  if (!problem.empty()) own.refuse("Error: Invalid group in Sobol sensitivity analysis", kSobolGroupKeyword, problem);
+  if (!problem.text.empty()) {
+    own.refuse("Error: Invalid group in Sobol sensitivity analysis", kSobolGroupKeyword,
+               static_cast<int>(problem.group) + 1, problem.text);
+  }
   if (const auto pair = dependence(distributions_, factors_)) {
     own.refuse(
         "Error: Sobol sensitivity analysis of correlated parameters", kSobolGroupKeyword,
@@ -172,16 +184,32 @@ std::string SobolTask::description() const {
                      settings.hasSecondOrder ? ", and second order" : "");
 }
 
-std::vector<std::string> SobolTask::summaryLines(const SearchSpace& /*space*/) const {
-  return {fmt::format("Design: {} blocks of {} model runs for {}, {} in all", design_.rows, design_.setsPerRow(),
-                      factorCountText(factors_), design_.setCount())};
+std::vector<std::string> SobolTask::summaryLines(const SearchSpace& space) const {
+  std::vector<std::string> lines{fmt::format("Design: {} blocks of {} model runs for {}, {} in all", design_.rows,
+                                             design_.setsPerRow(), factorCountText(factors_), design_.setCount())};
+  for (std::string& line : distributionLines(distributions_, space, kSensitivitySection)) {
+    lines.push_back(std::move(line));
+  }
+  return lines;
 }
 
-std::vector<std::string> SobolTask::warnings(const SearchSpace& /*space*/) const {
+std::vector<std::string> SobolTask::warnings(const SearchSpace& space) const {
+  std::vector<std::string> texts = distributionWarnings(distributions_, space);
   const std::size_t rows = design_.rows;
-  if (std::has_single_bit(rows)) return {};
-  return {fmt::format("{} = {} is no power of two: the points of the design are less even than those of {}",
-                      kSobolSampleSizeKeyword, rows, std::bit_floor(rows))};
+  if (std::has_single_bit(rows)) return texts;
+  texts.push_back(fmt::format("{} = {} is no power of two: the points of the design are less even than those of {}",
+                              kSobolSampleSizeKeyword, rows, std::bit_floor(rows)));
+  return texts;
+}
+
+std::vector<std::string> SobolTask::setDoubts(const SearchSpace& /*space*/, const Feasibility& feasibility) const {
+  if (!feasibility.isTested()) return {};
+  UniformGenerator random = draw().random;
+  const std::vector<ParameterSet> sets = sobolSets(design_, factors_, distributions_, random);
+  const InfeasibleSets found =
+      infeasibleSets(feasibility, sets, kWhatSets, static_cast<int>(sets.size()), kInfeasibleRemedy);
+  if (found.text.empty()) return {};
+  return {found.text};
 }
 
 TaskOutcome SobolTask::outcomeOf(const TaskContext& context, std::span<const EvaluationResult> results,
@@ -246,10 +274,14 @@ TaskOutcome SobolTask::run(const TaskContext& context) {
   {
     UniformGenerator random = draw().random;
     const std::vector<ParameterSet> sets = sobolSets(design_, factors_, distributions_, random);
-    warnOfInfeasibleSets(context, sets, "sets of the design", static_cast<int>(sets.size()));
+    warnOfInfeasibleSets(context, sets, kWhatSets, static_cast<int>(sets.size()), kInfeasibleRemedy);
+    context.log.line(setsOutsideBounds(sets, context.space));
     if (keepsSimulatedValues()) logRoomOfSimulatedValues(context, facts().resultFiles.simulatedValues, sets.size());
     results = context.evaluator.evaluateParameterSets(sets, DispatchMode::task);
   }
+  context.log.line(fmt::format("The indices of {} are computed{}",
+                               countText(context.measures.size() + context.objectives.size(), "output"),
+                               keepsSimulatedValues() ? ", and those of the simulated series over time" : ""));
   std::vector<std::string> warnings;
   TaskOutcome outcome = outcomeOf(context, results, warnings);
   logReport(context, outcome.report);

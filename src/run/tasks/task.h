@@ -68,6 +68,8 @@ struct TaskReading {
 
 /// What was expected instead of so many sets of n parameters, all of which are in memory; empty if they fit into it.
 std::optional<std::string> tooManySets(std::int64_t sets, std::size_t n);
+/// The same of a task that has but a part of its sets in memory.
+std::optional<std::string> tooManySets(std::int64_t sets);
 
 /// What a task uses when it runs.
 struct TaskContext {
@@ -192,6 +194,13 @@ class Task {
   /// Throws FatalError if run() would before its first model run, as there is no parameter set that can be run. Takes
   /// nothing from the random numbers of run().
   virtual void requireSets(const SearchSpace& /*space*/, const Feasibility& /*feasibility*/) const {}
+
+  /// What run() will warn of before its first model run: sets that will be evaluated although they cannot be run.
+  virtual std::vector<std::string> setDoubts(const SearchSpace& /*space*/, const Feasibility& /*feasibility*/) const {
+    return {};
+  }
+  /// The result file of an earlier run whose evaluations it takes, TaskContext::earlierSample; empty: none.
+  virtual std::string earlierResultFile() const { return {}; }
 
   /// Runs it. Throws FatalError and RunCancelled.
   virtual TaskOutcome run(const TaskContext& context) = 0;

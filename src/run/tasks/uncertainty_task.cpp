@@ -11,6 +11,13 @@
 #include "run/tasks/simulated_room.h"
 
 namespace mirevo {
+namespace {
+
+constexpr const char* kWhatSets = "sets of the sample";
+constexpr const char* kInfeasibleRemedy =
+    "With Redraw_Infeasible = 1 in UNCERTAINTY_ESTIMATION sets are drawn until all can be run";
+
+}  // namespace
 
 const TaskFacts& UncertaintyTask::facts() const {
   static constexpr TaskFacts kFacts{{3, "uncertainty"},
@@ -72,7 +79,7 @@ std::string UncertaintyTask::description() const {
 }
 
 std::vector<std::string> UncertaintyTask::summaryLines(const SearchSpace& space) const {
-  return distributionLines(settings.distributions, space);
+  return distributionLines(settings.distributions, space, kUncertaintySection);
 }
 
 std::vector<std::string> UncertaintyTask::warnings(const SearchSpace& space) const {
@@ -84,14 +91,22 @@ void UncertaintyTask::requireSets(const SearchSpace& /*space*/, const Feasibilit
   feasibleUncertaintySample(settings, randomSeed, feasibility);
 }
 
+std::vector<std::string> UncertaintyTask::setDoubts(const SearchSpace& /*space*/,
+                                                    const Feasibility& feasibility) const {
+  if (settings.redrawsInfeasible || !feasibility.isTested() || settings.distributions.size() == 0) return {};
+  const InfeasibleSets found = infeasibleSets(feasibility, uncertaintySample(settings, randomSeed, {}), kWhatSets,
+                                              settings.sampleSize, kInfeasibleRemedy);
+  if (found.text.empty()) return {};
+  return {found.text};
+}
+
 /// `acceptance`: a line on the sets drawn, if any can be drawn again.
 std::vector<ParameterSet> UncertaintyTask::drawSample(const TaskContext& context, std::string& acceptance) const {
   if (settings.distributions.size() == 0) return {};
   const auto messages = [&](std::string_view text) { context.log.line(text); };
   if (!settings.redrawsInfeasible) {
     std::vector<ParameterSet> sample = uncertaintySample(settings, randomSeed, messages);
-    warnOfInfeasibleSets(context, sample, "sets of the sample", settings.sampleSize,
-                         "With Redraw_Infeasible = 1 in UNCERTAINTY_ESTIMATION sets are drawn until all can be run");
+    warnOfInfeasibleSets(context, sample, kWhatSets, settings.sampleSize, kInfeasibleRemedy);
     return sample;
   }
   FeasibleSample sample = feasibleUncertaintySample(settings, randomSeed, context.feasibility, messages);

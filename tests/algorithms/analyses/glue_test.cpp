@@ -172,6 +172,19 @@ TEST(GlueJudge, IsTheMeasureOfTheNameOrElseTheObjectiveFunctionAndRefusesWhatCan
   EXPECT_FALSE(found({.judgedBy = "FLOW", .share = 0.1})->isObjective);
   EXPECT_EQ(found({.judgedBy = "level", .threshold = 2.0})->index, 1U);
   EXPECT_TRUE(found({.judgedBy = "fit", .threshold = -1.0})) << "any value may be one of an objective function";
+  const std::vector<OutputMeasure> alike{measureOf("NSE", "q"), measureOf("NSE", "Q"), measureOf("NSE", "Level")};
+  objectives[0].name = "LEVEL";
+  const auto among = [&](const char* name) {
+    return glueJudge({.judgedBy = name, .share = 0.1}, alike, objectives, refusal);
+  };
+  EXPECT_EQ(among("Q")->index, 1U);
+  EXPECT_EQ(among("q")->index, 0U);
+  EXPECT_TRUE(among("LEVEL")->isObjective) << "exactly this name before a measure's in another case";
+  EXPECT_FALSE(among("level")->isObjective);
+  const std::vector<OutputMeasure> three{measureOf("NSE", "qQ"), measureOf("NSE", "Qq")};
+  EXPECT_FALSE(glueJudge({.judgedBy = "qq", .share = 0.1}, three, objectives, refusal));
+  EXPECT_THAT(refusal.explanation, StartsWith("\"qq\" may be each of \"qQ\", \"Qq\", which differ by case alone"));
+  objectives[0].name = "fit";
   const std::pair<GlueSettings, const char*> refused[] = {
       {{.judgedBy = "flw", .share = 0.1},
        "expected the name of an output measure or an objective function, \"flow\", \"level\", \"fit\", \"flow\", found "

@@ -222,27 +222,63 @@ TEST(SobolReport, WarnsOfADesignThatIsTooSmall) {
                                            "too small to tell .* of fit are 0\\.[0-9]+ away.*Sample_Size = ")));
 }
 
+TEST(SobolReport, HasNoIndicesOfValuesWithoutAFiniteVarianceAndNoInteractionsOfOneParameter) {
+  const SobolFunction one{"one", [](std::span<const double> x) { return x[0]; }, {1.0}, {1.0}};
+  for (const double scale : {1.0, 1.0e260, 1.0e-260}) {
+    SobolDesignRun run(one, 64);
+    for (double& value : run.values) value *= scale;
+    SobolFindings findings;
+    findings.design = run.design;
+    findings.factors = run.problem.factors;
+    findings.parameters = {findings.factors.front().name};
+    findings.outputs.push_back(sobolOutput(run.design, run.values, run.bootstrap, "objective", "fit"));
+    findings.runCount = run.values.size();
+    std::string text;
+    for (const std::string& line : formatSobol(findings, "basin_Sobol.dat")) text += line + "\n";
+    EXPECT_THAT(text, ::testing::Not(::testing::HasSubstr("interactions explain")));
+    EXPECT_THAT(text, ::testing::Not(::testing::HasSubstr("nan")));
+    const char* none = "fit: no indices, the variance of its values is not a finite number";
+    EXPECT_EQ(text.find(none) != std::string::npos, scale != 1.0) << text;
+    std::string warnings;
+    for (const std::string& warning : sobolWarnings(findings)) warnings += warning;
+    EXPECT_EQ(warnings.find(none) != std::string::npos, scale != 1.0) << warnings;
+  }
+}
+
 TEST(SobolFactors, AreGroupsAndTheParametersInNone) {
   const std::vector<std::string> names{"Depth", "Rate", "Melt", "Lag"};
-  std::string problem;
+  SobolGroupProblem problem;
   const auto factors = sobolFactors(names, std::vector<std::string>{"soil: Melt, depth"}, problem);
-  ASSERT_EQ(problem, "");
+  ASSERT_EQ(problem.text, "");
   ASSERT_EQ(factors.size(), 3U);
   EXPECT_EQ(factors[0].name, "soil");
   EXPECT_THAT(factors[0].parameters, ::testing::ElementsAre(2U, 0U));
   EXPECT_EQ(factors[1].name, "Rate");
   EXPECT_EQ(factors[2].name, "Lag");
 
+  const std::vector<std::string> alike{"a", "A", "b"};
+  const auto exact = sobolFactors(alike, std::vector<std::string>{"g: A, B"}, problem);
+  ASSERT_EQ(problem.text, "");
+  EXPECT_THAT(exact.back().parameters, ::testing::ElementsAre(1U, 2U)) << "exactly this name, else but for case";
+  sobolFactors(std::vector<std::string>{"aB", "Ab"}, std::vector<std::string>{"g: ab"}, problem);
+  EXPECT_EQ(problem.text, "\"ab\" may be each of \"aB\", \"Ab\", which differ by case alone: write one of them");
+
+  // The last of the groups is the one that is refused.
   const std::pair<std::vector<std::string>, const char*> refused[] = {
       {{"Depth, Rate"}, "expected a name and its parameters, as in 'soil: Depth', found \"Depth, Rate\""},
       {{"soil: Dept, Rate"}, "there is no variable parameter \"Dept\"; did you mean 'Depth'?"},
       {{"soil: Depth", "snow: Depth, Melt"}, "parameter 'Depth' is in a group twice"},
       {{"soil: Depth", "soil: Melt"}, "there are two groups 'soil'"},
-      {{"Lag: Depth"}, "group 'Lag' has the name of a parameter that is not in it"},
+      {{"soil: Depth", "snow: Rate,"},
+       "expected names of parameters behind ':', between commas, found none in \"snow: "
+       "Rate,\""},
+      {{"soil:"}, "expected names of parameters behind ':', between commas, found none in \"soil:\""},
+      {{"soil: Rate", "Lag: Depth"}, "group 'Lag' has the name of a parameter that is not in it"},
   };
   for (const auto& [groups, expected] : refused) {
     EXPECT_THAT(sobolFactors(names, groups, problem), ::testing::IsEmpty());
-    EXPECT_EQ(problem, expected);
+    EXPECT_EQ(problem.text, expected);
+    EXPECT_EQ(problem.group, groups.size() - 1);
   }
 }
 

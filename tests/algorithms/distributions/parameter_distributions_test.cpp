@@ -127,7 +127,15 @@ TEST(GaussianCopula, RefusesCorrelationsThatContradictEachOther) {
     for (std::size_t j = 0; j < 3; ++j) smaller[i][j] *= i == j ? 1 : 0.5555;
   }
   EXPECT_EQ(refusalOf([&] { copulaOf(smaller); }), "accepted");
-  EXPECT_THAT(refusalOf([&] { copulaOf({{1, 1}, {1, 1}}); }), ::testing::HasSubstr("not positive definite"));
+  for (const double r : {1.0, -1.0, 1.0 - 1e-10}) {
+    EXPECT_THAT(
+        refusalOf([&] {
+          copulaOf({{1, r}, {r, 1}});
+        }),
+        ::testing::HasSubstr("a function of others, but for rounding: the smallest eigenvalue of their matrix is "
+                             "0, expected 1e-08 or more"));
+  }
+  EXPECT_EQ(refusalOf([&] { copulaOf({{1, 0.999}, {0.999, 1}}); }), "accepted");
 }
 
 }  // namespace

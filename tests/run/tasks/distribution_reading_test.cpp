@@ -158,7 +158,11 @@ TEST_F(DistributionReading, CorrelationsComeFromAFileAndFromPairs) {
       {pair("Rate", "Rate", "0.2"), "Correlation of parameters invalid", "expected another parameter than Rate"},
       {pair("Depth", "Rate", "1.2"), "Correlation of parameters invalid", "expected -1 to 1, found 1.2"},
       {pair("Depth", "Rate", "1"), "Correlations of the parameters are not positive definite",
-       "the smallest eigenvalue of their matrix is "},
+       "the smallest eigenvalue of their matrix is 0"},
+      {"TqSEKdxListItemCount = 2\n[PAIR_1]\nFirst_Parameter = 'Depth'\nSecond_Parameter = 'Rate'\nCorrelation = "
+       "0.5\n[/PAIR_1]\n[PAIR_2]\nFirst_Parameter = 'Rate'\nSecond_Parameter = 'Depth'\nCorrelation = "
+       "-0.5\n[/PAIR_2]",
+       "Correlation of parameters given twice", " have 0.5 at setup.kdx:"},
       {"Correlation_File = 'absent.dat'", "Unable to open absent.dat", ""},
       {"Correlation_File = 'none.dat'", "Correlation file invalid", "such as \"Depth\"; found none of them"},
       {"Correlation_File = 'half.dat'", "Correlation file invalid",
