@@ -7,6 +7,7 @@
 #include <fmt/format.h>
 
 #include "algorithms/analyses/covariance.h"
+#include "algorithms/searches/glm_step.h"
 #include "algorithms/numbers/uniform_generator.h"
 #include "algorithms/surrogate/quadratic_surrogate.h"
 
@@ -57,6 +58,26 @@ void measureCovariance() {
   fmt::print("covariance of {} parameters from {} observations: {:.1f} s of processor time\n", kParameters,
              kObservations, processorSeconds() - start);
   fmt::print("   {} kept, the last one's standard deviation {}\n", found.kept.size(), found.standardDeviations.back());
+}
+
+void measureGlm() {
+  constexpr std::size_t kParameters = 200;
+  constexpr std::size_t kObservations = 10000;
+  UniformGenerator random(1);
+  const std::vector<double> residuals = deviates(kObservations, random);
+  std::vector<std::vector<double>> jacobian;
+  for (std::size_t j = 0; j < kParameters; ++j) jacobian.push_back(deviates(kObservations, random));
+  SearchBounds bounds{std::vector<double>(kParameters, -0.02), std::vector<double>(kParameters, 0.02),
+                      std::vector<double>(kParameters, 0.0)};
+  const double start = processorSeconds();
+  GlmLinearModel model(std::move(jacobian), residuals, bounds.initial, bounds, 1e-7);
+  const double reduced = processorSeconds();
+  double moved = 0.0;
+  for (const double lambda : {0.0, 0.01, 0.1, 0.001}) moved += model.setFor(lambda).front();
+  fmt::print("GLM with {} parameters and {} observations: {:.2f} s of processor time for the triangle, {:.2f} s for "
+             "four steps\n",
+             kParameters, kObservations, reduced - start, processorSeconds() - reduced);
+  fmt::print("   the first parameter moves by {} in all\n", moved);
 }
 
 }  // namespace mirevo::bench

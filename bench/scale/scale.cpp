@@ -153,6 +153,7 @@ void surrogate(const std::string& /*folder*/, int /*count*/) {
 }
 void covariance(const std::string& /*folder*/, int /*count*/) {
   measureCovariance();
+  measureGlm();
 }
 
 struct Figure {

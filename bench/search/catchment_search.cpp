@@ -1,6 +1,6 @@
 /// Prints what the searches need on the catchments of the examples: the tables of docs/algorithms/which-search.md. The
 /// models run inside this program, with parameters, bounds, scales and years of the setups. Usage: catchment_search
-/// STAGED_EXAMPLES [piscataquis | sitter], the folder being examples/ in a build folder, where the targets
+/// STAGED_EXAMPLES [piscataquis | sitter [GLM]], the folder being examples/ in a build folder, where the targets
 /// example_piscataquis and example_sitter put data.
 
 #include <cmath>
@@ -11,6 +11,7 @@
 
 #include <fmt/format.h>
 
+#include "algorithms/searches/glm.h"
 #include "models/gr4j_cemaneige.h"
 #include "models/model_files.h"
 #include "models/muskingum.h"
@@ -71,6 +72,27 @@ std::vector<double> discharge(const models::Parameters& parameters, const Days& 
   return flows;
 }
 
+/// What GLM needs of a catchment: the residuals of a set, the sum of whose squares is the sum of the squared terms of
+/// the aggregate.
+using Residuals = std::function<std::vector<double>(const std::vector<double>&)>;
+
+struct Catchment {
+  TestFunction function;
+  Residuals residuals;
+};
+
+/// Appends the differences in the years from `first` to `last`, divided by `divisor` and the root of their number.
+void appendResiduals(const std::vector<double>& simulated, const std::vector<double>& observed, const Days& days,
+                     std::string_view first, std::string_view last, double divisor, std::vector<double>& residuals) {
+  const std::size_t begin = residuals.size();
+  for (std::size_t i = 0; i < simulated.size() && i < observed.size(); ++i) {
+    if (days.dates[i] < first || days.dates[i] > last || observed[i] < -998.0) continue;
+    residuals.push_back((simulated[i] - observed[i]) / divisor);
+  }
+  const double root = std::sqrt(static_cast<double>(residuals.size() - begin));
+  for (std::size_t i = begin; i < residuals.size(); ++i) residuals[i] /= root;
+}
+
 /// A target that a search is to reach: optimalValue is a tolerance below it.
 TestFunction searched(const std::vector<std::pair<double, double>>& bounds, double target,
                       std::function<double(const std::vector<double>&)> value) {
@@ -85,40 +107,132 @@ TestFunction searched(const std::vector<std::pair<double, double>>& bounds, doub
 }
 
 /// Six parameters; the error of the discharge in m3/s, of which the best known value is 11.666.
-TestFunction piscataquis(const std::string& folder) {
+Catchment piscataquis(const std::string& folder) {
   const Days days = readForcing(folder + "/model/forcing.csv");
   const std::vector<double> observed = readObserved(folder + "/data/discharge.csv", "discharge_m3s");
-  return searched(
-      {{std::log(50.0), std::log(2000.0)}, {-5, 5}, {std::log(10.0), std::log(500.0)}, {0.5, 5}, {0, 1}, {1, 10}},
-      11.75, [days, observed](const std::vector<double>& x) {
-        const models::Parameters p{std::exp(x[0]), x[1], std::exp(x[2]), x[3], x[4], x[5]};
-        return errorOf(discharge(p, days, 771.486538), observed, days, "1981-10-01", "1990-09-30");
-      });
+  const auto flow = [days](const std::vector<double>& x) {
+    return discharge({std::exp(x[0]), x[1], std::exp(x[2]), x[3], x[4], x[5]}, days, 771.486538);
+  };
+  return {
+      searched(
+          {{std::log(50.0), std::log(2000.0)}, {-5, 5}, {std::log(10.0), std::log(500.0)}, {0.5, 5}, {0, 1}, {1, 10}},
+          11.75,
+          [=](const std::vector<double>& x) { return errorOf(flow(x), observed, days, "1981-10-01", "1990-09-30"); }),
+      [=](const std::vector<double>& x) {
+        std::vector<double> residuals;
+        appendResiduals(flow(x), observed, days, "1981-10-01", "1990-09-30", 1.0, residuals);
+        return residuals;
+      }};
 }
 
 /// Eleven parameters; the errors of both gauges, each divided by the standard deviation that docs/examples/sitter.md
 /// has.
-TestFunction sitter(const std::string& folder, double target) {
+Catchment sitter(const std::string& folder, double target) {
   const Days upper = readForcing(folder + "/model/upper_forcing.csv");
   const Days lower = readForcing(folder + "/model/lower_forcing.csv");
   const std::vector<double> appenzell = readObserved(folder + "/data/discharge.csv", "appenzell_m3s");
   const std::vector<double> stGallen = readObserved(folder + "/data/discharge.csv", "st_gallen_m3s");
+  constexpr double kAppenzellScale = 1.0510299772763;
+  constexpr double kStGallenScale = 2.75310188505;
   const std::pair<double, double> x1{std::log(20.0), std::log(2000.0)};
   const std::pair<double, double> x3{std::log(5.0), std::log(500.0)};
-  return searched({x1, {-5, 5}, x3, {0.5, 4}, x1, {-5, 5}, x3, {0.5, 4}, {0, 1}, {1, 10}, {std::log(0.02), 0.0}},
-                  target, [upper, lower, appenzell, stGallen](const std::vector<double>& x) {
-                    const models::Parameters above{std::exp(x[0]), x[1], std::exp(x[2]), x[3], x[8], x[9]};
-                    const models::Parameters below{std::exp(x[4]), x[5], std::exp(x[6]), x[7], x[8], x[9]};
-                    const std::vector<double> flow = discharge(above, upper, 74.4);
-                    std::vector<double> joined = discharge(below, lower, 186.6);
-                    models::MuskingumRiver river(std::exp(x[10]), 0.2);
-                    for (std::size_t i = 0; i < joined.size(); ++i) joined[i] += river.advance(flow[i]);
-                    return errorOf(flow, appenzell, upper, "1982-10-01", "1992-09-30") / 1.0510299772763 +
-                           errorOf(joined, stGallen, upper, "1982-10-01", "1992-09-30") / 2.75310188505;
-                  });
+  struct Flows {
+    std::vector<double> appenzell;
+    std::vector<double> stGallen;
+  };
+  const auto flows = [upper, lower](const std::vector<double>& x) {
+    const models::Parameters above{std::exp(x[0]), x[1], std::exp(x[2]), x[3], x[8], x[9]};
+    const models::Parameters below{std::exp(x[4]), x[5], std::exp(x[6]), x[7], x[8], x[9]};
+    Flows found{discharge(above, upper, 74.4), discharge(below, lower, 186.6)};
+    models::MuskingumRiver river(std::exp(x[10]), 0.2);
+    for (std::size_t i = 0; i < found.stGallen.size(); ++i) found.stGallen[i] += river.advance(found.appenzell[i]);
+    return found;
+  };
+  return {
+      searched({x1, {-5, 5}, x3, {0.5, 4}, x1, {-5, 5}, x3, {0.5, 4}, {0, 1}, {1, 10}, {std::log(0.02), 0.0}}, target,
+               [=](const std::vector<double>& x) {
+                 const Flows found = flows(x);
+                 return errorOf(found.appenzell, appenzell, upper, "1982-10-01", "1992-09-30") / kAppenzellScale +
+                        errorOf(found.stGallen, stGallen, upper, "1982-10-01", "1992-09-30") / kStGallenScale;
+               }),
+      [=](const std::vector<double>& x) {
+        const Flows found = flows(x);
+        std::vector<double> residuals;
+        appendResiduals(found.appenzell, appenzell, upper, "1982-10-01", "1992-09-30", kAppenzellScale, residuals);
+        appendResiduals(found.stGallen, stGallen, upper, "1982-10-01", "1992-09-30", kStGallenScale, residuals);
+        return residuals;
+      }};
 }
 
-void print(const TestFunction& function, const std::vector<int>& budgets, int successBudget, int seeds) {
+/// The target evaluator with the residuals where a model run has its simulated values.
+class ResidualEvaluator final : public Evaluator {
+ public:
+  ResidualEvaluator(TargetEvaluator& target, const Residuals& residuals) : target_(target), residuals_(residuals) {}
+
+  std::vector<EvaluationResult> evaluateParameterSets(std::span<const ParameterSet> sets, DispatchMode mode) override {
+    std::vector<EvaluationResult> results = target_.evaluateParameterSets(sets, mode);
+    for (std::size_t i = 0; i < sets.size(); ++i) results[i].simulatedValues = residuals_(sets[i]);
+    return results;
+  }
+
+ private:
+  TargetEvaluator& target_;
+  const Residuals& residuals_;
+};
+
+Outcome glmTrial(const Catchment& catchment, const GlmSettings& settings, int budget, int seed, bool stopsAtTarget) {
+  const TestFunction& function = catchment.function;
+  ResidualProblem residuals;
+  SearchBounds bounds{function.lower, function.upper, {}};
+  for (std::size_t j = 0; j < function.size(); ++j) {
+    bounds.initial.push_back(0.5 * (function.lower[j] + function.upper[j]));
+    residuals.space.names.push_back(fmt::format("x{}", j + 1));
+    residuals.space.transformation.push_back(TransformationType::none);
+  }
+  residuals.space.lower = function.lower;
+  residuals.space.upper = function.upper;
+  residuals.space.initial = bounds.initial;
+  residuals.residualsOf = [](const EvaluationResult& result) {
+    return ResidualRows{result.simulatedValues, std::vector<double>(result.simulatedValues.size(), 0.0)};
+  };
+  TargetEvaluator target(function, {.budget = budget}, seed);
+  ResidualEvaluator evaluator(target, catchment.residuals);
+  UniformGenerator random(seed);
+  InitialSampleSettings sample;
+  sample.includeInitialParameters = false;
+  SearchProblem problem{bounds, {budget, 10, 0.001}, sample, {}, evaluator, random};
+  problem.residuals = &residuals;
+  Glm search(settings, std::move(problem));
+  search.initialise();
+  while (!search.isTerminated() && !(stopsAtTarget && target.hasHitTarget())) search.advance();
+  return {target.hasHitTarget(), stopsAtTarget ? target.evaluationsToTarget : target.evaluations, target.bestInTime};
+}
+
+void printGlm(const Catchment& catchment, const std::vector<int>& budgets, int successBudget, int seeds) {
+  const std::vector<std::pair<std::string_view, GlmSettings>> searches = {
+      {"GLM, 20 sets, 10 starts", {.sampleSize = 20, .startCount = 10}},
+      {"GLM, no Broyden updates", {.broydenUpdates = 0, .sampleSize = 20, .startCount = 10}},
+      {"GLM, no Broyden updates, steps of 0.001",
+       {.perturbationFraction = 0.001, .broydenUpdates = 0, .sampleSize = 20, .startCount = 10}}};
+  for (const auto& [name, settings] : searches) {
+    std::vector<Outcome> outcomes;
+    for (int seed = 1; seed <= seeds; ++seed) {
+      outcomes.push_back(glmTrial(catchment, settings, successBudget, seed, true));
+    }
+    fmt::print("| {} | {} |", name, successText(outcomes));
+    for (const int budget : budgets) {
+      std::vector<Outcome> found;
+      for (int seed = 1; seed <= seeds; ++seed) found.push_back(glmTrial(catchment, settings, budget, seed, false));
+      fmt::print(" {:.4f} |", medianOf(found));
+    }
+    fmt::print("\n");
+    std::fflush(stdout);
+  }
+}
+
+void print(const Catchment& catchment, std::string_view search, const std::vector<int>& budgets, int successBudget,
+           int seeds) {
+  const TestFunction& function = catchment.function;
   const std::vector<std::pair<std::string_view, Setting>> searches = {
       {"CMA-ES", {.method = Method::cma}},
       {"CMA-ES, twice the population",
@@ -132,7 +246,9 @@ void print(const TestFunction& function, const std::vector<int>& budgets, int su
   fmt::print("\n|---|---|");
   for (std::size_t i = 0; i < budgets.size(); ++i) fmt::print("---|");
   fmt::print("\n");
+  if (search.empty() || search == "GLM") printGlm(catchment, budgets, successBudget, seeds);
   for (auto [name, setting] : searches) {
+    if (search == "GLM") break;
     setting.budget = successBudget;
     setting.stopsAtTarget = true;
     fmt::print("| {} | {} |", name, successText(runTrials(function, setting, false, seeds)));
@@ -153,14 +269,15 @@ int main(int argc, char** argv) {
   if (argc < 2) return 1;
   const std::string folder = argv[1];
   const std::string which = argc > 2 ? argv[2] : "";
+  const std::string search = argc > 3 ? argv[3] : "";
   if (which.empty() || which == "piscataquis") {
     fmt::print("\nPiscataquis, 6 parameters, target 11.75 m3/s\n");
-    mirevo::print(mirevo::piscataquis(folder + "/piscataquis"), {300, 500, 900}, 900, 20);
+    mirevo::print(mirevo::piscataquis(folder + "/piscataquis"), search, {300, 500, 900}, 900, 20);
   }
   if (which.empty() || which == "sitter") {
     constexpr double kTarget = 3.72;
     fmt::print("\nSitter, 11 parameters, target {}\n", kTarget);
-    mirevo::print(mirevo::sitter(folder + "/sitter", kTarget), {}, 2000, 10);
+    mirevo::print(mirevo::sitter(folder + "/sitter", kTarget), search, {}, 2000, 10);
   }
   return 0;
 }

@@ -62,6 +62,8 @@ SECTION_PAGES = {
     "SCE_CONTROL_PARAMETERS": "docs/algorithms/sce",
     "PSE_CONTROL_PARAMETERS": "docs/algorithms/pse",
     "DDS_CONTROL_PARAMETERS": "docs/algorithms/dds",
+    "CMAES_CONTROL_PARAMETERS": "docs/algorithms/cma-es",
+    "GLM_CONTROL_PARAMETERS": "docs/algorithms/glm",
     "INITIAL_SAMPLE": "docs/algorithms/initial-sample",
     "STOPPING_CRITERIA": "docs/algorithms/stopping",
     "SURROGATE_MODEL_PARAMETERS": "docs/algorithms/surrogate",

@@ -1,6 +1,6 @@
 set(stage ${CMAKE_CURRENT_BINARY_DIR}/piscataquis)
 set(staged)
-foreach(file piscataquis.kdx sensitivity.kdx morris.kdx sobol.kdx uncertainty.kdx glue.kdx dream.kdx scenarios.kdx data/piscataquis_daily.csv data/PROVENANCE.md model/run.sh model/parameters.tpl
+foreach(file piscataquis.kdx glm.kdx sensitivity.kdx morris.kdx sobol.kdx uncertainty.kdx glue.kdx dream.kdx scenarios.kdx data/piscataquis_daily.csv data/PROVENANCE.md model/run.sh model/parameters.tpl
         model/parameters.txt)
   stage_file(${CMAKE_CURRENT_LIST_DIR}/${file} ${stage}/${file})
 endforeach()

@@ -86,6 +86,14 @@ inline constexpr RunFile kSobolConvergence{"_SobolConvergence", ".dat", false, t
 inline constexpr std::array kSensitivityTables{kCovariance,    kCorrelation, kParameterLimits, kJacobian,
                                                kSensitivities, kMorris,      kSobol,           kSobolConvergence};
 
+/// Those of a search by residuals.
+inline constexpr RunFile kEstimateCovariance{"_Optimisation_Covariance", ".dat", false, true};
+inline constexpr RunFile kEstimateCorrelation{"_Optimisation_Correlation", ".dat", false, true};
+inline constexpr RunFile kEstimateLimits{"_Optimisation_ParameterLimits", ".dat", false, true};
+inline constexpr RunFile kEstimateJacobian{"_Optimisation_Jacobian", ".dat", false, true};
+inline constexpr std::array kEstimateTables{kEstimateCovariance, kEstimateCorrelation, kEstimateLimits,
+                                            kEstimateJacobian};
+
 /// What all tasks call alike behind their own stem.
 constexpr RunFile restartFile(std::string_view stem) {
   return {.stem = stem, .extension = ".dat", .mark = "# What the results beside this file depend on"};
@@ -111,7 +119,7 @@ inline constexpr ResultFileNames kSensitivity{
 inline constexpr ResultFileNames kOptimisation{
     {"_Optimisation", ".dat"},           restartFile("_Optimisation_Restart"), simulatedFile("_Optimisation_Simulated"),
     {"_Optimisation_Run", ".dat"},       {"_Optimisation_Failures", ".dat"},   {"_Optimisation_Pairs", ".dat"},
-    {"_Optimisation_Checksums", ".dat"}, {"_Optimisation_NotKept", ".dat"},    {}};
+    {"_Optimisation_Checksums", ".dat"}, {"_Optimisation_NotKept", ".dat"},    kEstimateTables};
 
 inline constexpr std::string_view kFailuresMark = "# Failed evaluations of ";
 /// Stands beside the setup without its name, for the run that was the first of those going on in the folder; another

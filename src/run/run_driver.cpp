@@ -349,7 +349,8 @@ TaskContext RunDriver::taskContext() {
           [this](const std::string& file) {
             return readEarlierSample(file, config_, parameters_->searchSpace(), runner_->output().observedSeries());
           },
-          runner_->output().validationObservations()};
+          runner_->output().validationObservations(),
+          config_.aggregationMethod};
 }
 
 const TaskOutcome& RunDriver::runTask() {

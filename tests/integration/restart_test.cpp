@@ -52,6 +52,7 @@ fi)");
   for (const RunSettings& settings :
        {RunSettings{.algorithm = 1, .usesSurrogate = true, .maxEvaluations = 60},
         RunSettings{.search = "OPSE", .maxEvaluations = 60}, RunSettings{.search = "CMA-ES", .maxEvaluations = 60},
+        RunSettings{.search = "GLM", .maxEvaluations = 30},
         RunSettings{.option = 3, .maxEvaluations = 40}}) {
     ++kind;
     writeSetup(settings);
@@ -150,7 +151,8 @@ TEST_F(Restart, ARaisedBudgetTakesAFinishedSearchFurther) {
   for (const RunSettings& settings : {RunSettings{.algorithm = 0},
                                       {.algorithm = 1, .usesSurrogate = true},
                                       {.search = "OPSE"},
-                                      {.search = "CMA-ES"}}) {
+                                      {.search = "CMA-ES"},
+                                      {.search = "GLM"}}) {
     writeSetup(settings);
     run();
     folder_.editSetup("Max_No_Evaluations = 40", "Max_No_Evaluations = 70");

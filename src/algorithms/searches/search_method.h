@@ -25,6 +25,7 @@ struct SearchFacts {
   bool usesSurrogate = false;       ///< a surrogate model can choose among its proposals
   bool drawsInitialSample = false;  ///< it begins with the sample that the section INITIAL_SAMPLE describes
   bool needsRanges = false;         ///< it uses the range of each parameter, which must not be empty
+  bool usesResiduals = false;       ///< it needs the residuals of every run, and continuous parameters
   /// Of a search that does not fill several slots: what a job of several processes runs at once all the same.
   std::string_view runsAtOnceUnderMpi = {};
   std::string_view populationKeywords = {};  ///< "Population_Size"; empty if it has no population
@@ -77,6 +78,8 @@ class SearchMethod {
   virtual std::vector<SearchAdvice> advice(std::size_t /*n*/) const { return {}; }
   /// Settings that are valid and of which it is certain that they make the search pointless.
   virtual std::vector<SearchDoubt> doubts() const { return {}; }
+  /// Settings that do not fit the parameters.
+  virtual std::optional<SettingRefusal> refusalFor(const SearchSpace& /*space*/) const { return std::nullopt; }
   /// The fixed text for a budget below 1, if the search has one of its own.
   virtual std::string_view budgetRefusal() const { return {}; }
   /// Whether it evaluates a sample from which the scale of the objective functions can be determined.

@@ -7,6 +7,7 @@
 
 #include "algorithms/searches/cma_es.h"
 #include "algorithms/searches/dds.h"
+#include "algorithms/searches/glm.h"
 #include "algorithms/searches/opse.h"
 #include "algorithms/searches/pdds.h"
 #include "algorithms/searches/pse.h"
@@ -17,7 +18,7 @@ namespace mirevo {
 const ChoiceTable<SearchMethod>& searchMethods() {
   /// A new search is added here.
   static const auto searches =
-      ChoiceTable<SearchMethod>::of<SceMethod, PseMethod, DdsMethod, PddsMethod, OpseMethod, CmaEsMethod>();
+      ChoiceTable<SearchMethod>::of<SceMethod, PseMethod, DdsMethod, PddsMethod, OpseMethod, CmaEsMethod, GlmMethod>();
   return searches;
 }
 

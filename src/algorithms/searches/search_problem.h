@@ -14,6 +14,7 @@
 namespace mirevo {
 
 class ProposalSelector;
+struct ResidualProblem;
 
 /// A search with a smaller budget, from whose best parameter set a search with a raised budget continues.
 struct EarlierSearch {
@@ -32,6 +33,7 @@ struct SearchProblem {
   ProposalSelector* selector = nullptr;             ///< of a surrogate-assisted search
   std::vector<EarlierSearch> earlierSearches = {};  ///< the searches that this one continues, in order
   Feasibility feasibility = {};                     ///< which sets can be run, of a model with constraints
+  ResidualProblem* residuals = nullptr;             ///< of a search by residuals
 };
 
 }  // namespace mirevo

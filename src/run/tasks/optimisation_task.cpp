@@ -10,11 +10,13 @@
 
 #include <fmt/format.h>
 
+#include "algorithms/numbers/lapack_functions.h"
 #include "common/fatal_error.h"
 #include "common/files.h"
 #include "common/text.h"
 #include "measures/statistics.h"
 #include "run/access/file_validation.h"
+#include "run/tasks/analysis_names.h"
 #include "run/tasks/infeasible_sets.h"
 #include "run/tasks/off_grid.h"
 #include "run/tasks/watched_evaluator.h"
@@ -68,6 +70,22 @@ void refuseEmptyRanges(const TaskReading& reading) {
         "Error: Lower bound equal to upper bound for parameter " + parameter.name, "Upper_Bound",
         fmt::format("expected more than {} for a search by {}; Parameter_Type = 1 fixes a parameter",
                     parameter.lowerBound, searchesWith(&SearchFacts::needsRanges, "or")));
+  }
+}
+
+/// Derivatives need parameters that can change by a little.
+void refuseIntegers(const TaskReading& reading, std::string_view search) {
+  for (std::size_t i = 0; i < reading.parameters.size(); ++i) {
+    const ModelParameter& parameter = reading.parameters[i];
+    if (parameter.parameterType != ParameterType::variable ||
+        parameter.transformationType != TransformationType::integer) {
+      continue;
+    }
+    reading.parameterSections[i].refuse(
+        "Error: Integer parameter " + parameter.name + " in a search by derivatives", "Transformation_Type",
+        fmt::format("expected 0 or 1 for {}, found an integer parameter, by which there are no derivatives; "
+                    "Parameter_Type = 1 fixes it, other searches vary it",
+                    search));
   }
 }
 
@@ -339,6 +357,16 @@ void OptimisationTask::readMethod(const TaskReading& reading, const SetupSection
                                              advice.found, advice.advised));
   }
   for (const SearchDoubt& doubt : method->doubts()) control.warn(doubt.keyword, doubt.text);
+  if (method->facts().usesResiduals) requireResiduals(reading, section);
+  control.require(method->refusalFor(BuildSearchSpace(reading.parameters)));
+}
+
+void OptimisationTask::requireResiduals(const TaskReading& reading, const SetupSection& section) const {
+  refuseIntegers(reading, method->facts().name.name);
+  if (const auto problem = WeightedResiduals::problemOf(reading.measures, reading.objectives)) {
+    section.refuse(fmt::format("Error: No residuals for {} algorithm", method->facts().name.name), kAlgorithmKeyword,
+                   *problem);
+  }
 }
 
 void OptimisationTask::warnOfOneLoop(const SetupSection& section) const {
@@ -476,18 +504,24 @@ void OptimisationTask::requireSets(const SearchSpace& space, const Feasibility& 
   method->make(problemOf(space, feasibility, evaluator, random))->initialise();
 }
 
-SearchSummary OptimisationTask::search(const TaskContext& context, Evaluator& evaluator) const {
+SearchSummary OptimisationTask::search(const TaskContext& context, Evaluator& evaluator) {
   UniformGenerator random(randomSeed);
   SearchProblem problem = problemOf(context.space, context.feasibility, evaluator, random);
   warnOfGivenSets(context, problem);
   std::optional<ProposalSelector> selector;
   if (usesSurrogate()) problem.selector = &selector.emplace(surrogate, problem.bounds, problem.feasibility);
+  if (fitting_) problem.residuals = &fitting_->problem();
   return method->run(std::move(problem), [&context](std::string_view line) { context.log.reportLine(line); });
 }
 
 TaskOutcome OptimisationTask::run(const TaskContext& context) {
   if (surrogateUse != SurrogateUse::no && surrogateUse != SurrogateUse::yes) return {std::string(kEndOfTask)};
 
+  if (method->facts().usesResiduals) {
+    lapack();  // missed before the model runs, if ever
+    fitting_ = std::make_unique<ResidualFitting>(context);
+    if (const auto text = fitting_->otherMeasuresText(context)) context.log.warning(*text);
+  }
   WatchedEvaluator evaluator(context.evaluator);
   const SearchSummary summary = search(context, evaluator);
   context.log.line("");
@@ -506,10 +540,28 @@ TaskOutcome OptimisationTask::run(const TaskContext& context) {
   if (best.front().empty()) return {summary.terminationMessage};
   if (context.searchEnded) context.searchEnded(summary);
   logBestSet(context, best.front(), summary.bestResult);
+  TaskOutcome outcome{summary.terminationMessage};
+  if (fitting_) {
+    fitting_->addCovariance(context, outcome);
+    logReport(context, outcome.report);
+  }
   context.log.line("");
   context.log.line("Final model run with the best parameter set:");
   context.evaluator.evaluateParameterSets(best, DispatchMode::finalRun);
-  return {summary.terminationMessage};
+  return outcome;
+}
+
+std::optional<TaskOutcome> OptimisationTask::unfinishedOutcome(const TaskContext& context,
+                                                               const UnfinishedBatch& /*made*/) const {
+  if (!fitting_ || !fitting_->hasDerivatives()) return std::nullopt;
+  TaskOutcome outcome{std::string(kEndOfTask)};
+  fitting_->addCovariance(context, outcome);
+  return outcome;
+}
+
+std::optional<int> OptimisationTask::evaluationsInBatches() const {
+  if (!fitting_ || !fitting_->hasDerivatives()) return 0;
+  return fitting_->problem().evaluationCount;
 }
 
 TaskReport OptimisationTask::report() const {

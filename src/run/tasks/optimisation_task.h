@@ -4,6 +4,7 @@
 #include "algorithms/searches/search_methods.h"
 #include "algorithms/searches/stopping_criteria.h"
 #include "algorithms/surrogate/proposal_selector.h"
+#include "run/tasks/residual_fit.h"
 #include "run/tasks/task.h"
 
 namespace mirevo {
@@ -28,7 +29,14 @@ class OptimisationTask final : public Task {
   bool drawsRandomNumbers() const override { return true; }
   std::optional<OneSlotOnly> needsOneSlot() const override;
   void requireSets(const SearchSpace& space, const Feasibility& feasibility) const override;
+  /// A search by residuals needs them in every result.
+  bool keepsSimulatedValues() const override { return method && method->facts().usesResiduals; }
+  SeriesPrecision keptPrecision() const override {
+    return keepsSimulatedValues() ? SeriesPrecision::exact : SeriesPrecision::single;
+  }
   TaskOutcome run(const TaskContext& context) override;
+  std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const override;
+  std::optional<int> evaluationsInBatches() const override;
   TaskReport report() const override;
   std::optional<RaisedBudget> raisedBudget(const SearchHistory& history) const override;
   void continueFrom(const std::vector<EarlierSearch>& searches) override { earlierSearches_ = searches; }
@@ -55,12 +63,14 @@ class OptimisationTask final : public Task {
   void warnOfGivenSets(const TaskContext& context, const SearchProblem& problem) const;
   SearchProblem problemOf(const SearchSpace& space, const Feasibility& feasibility, Evaluator& evaluator,
                           UniformGenerator& random) const;
-  SearchSummary search(const TaskContext& context, Evaluator& evaluator) const;
+  SearchSummary search(const TaskContext& context, Evaluator& evaluator);
+  void requireResiduals(const TaskReading& reading, const SetupSection& section) const;
 
   std::optional<std::string> sampleText_;         ///< of a sample file, which is read once
   std::vector<std::vector<double>> givenValues_;  ///< those of a file, one entry per model parameter
   EarlierSets earlierSets_;                       ///< of an earlier run
   std::vector<EarlierSearch> earlierSearches_;
+  std::unique_ptr<ResidualFitting> fitting_;  ///< of a search by residuals, once it runs
 };
 
 }  // namespace mirevo

@@ -101,6 +101,7 @@ struct TaskContext {
   std::function<EarlierSample(const std::string& resultFile)> earlierSample = {};
   /// The observations in validation periods, if the task keepsSimulatedValues().
   std::span<const ValidationObservations> validationObservations = {};
+  AggregationMethod aggregationMethod = AggregationMethod::none;
 };
 
 /// A file beside the results.
