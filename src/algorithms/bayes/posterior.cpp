@@ -17,6 +17,7 @@ namespace {
 
 constexpr double kTradeOff = 0.7;  // correlation from which two parameters are said to trade off
 constexpr std::size_t kBins = 40;
+constexpr const char* kGoOn = "A larger Sample_Size and Restart = 1 go on from here";
 
 /// Calls `take(state)` for each state behind burn-in.
 template <class Take>
@@ -79,19 +80,23 @@ void appendConvergence(const DreamSettings& settings, const ShownDimensions& dim
     lines.emplace_back("The chains have converged, as far as R-hat and the effective sample sizes tell");
     return;
   }
-  if (!apart.empty()) {
+  const std::string fewText =
+      few.empty() ? "" : fmt::format("the effective sample size is below {:g} for {}", settings.effectiveSize, few);
+  if (apart.empty()) {
     lines.push_back(fmt::format(
-        "Warning: The chains have not converged: R-hat is above {:g} for {}. The quantiles below are not those of the "
-        "posterior yet. Raise Sample_Size; where R-hat stays large, the posterior may have several peaks (more chains "
-        "help: Chain_Count) or burn-in is too short (Burn_In_Share), which the states in _Chains.dat show",
-        settings.rHatLimit, apart));
+        "Warning: The chains have not converged: R-hat is at most {:g} for all parameters, but {}. Means are "
+        "known to about a standard deviation divided by its square root, the 5 and 95 % quantiles less "
+        "well. {}",
+        settings.rHatLimit, fewText, kGoOn));
+    return;
   }
-  if (!few.empty()) {
-    lines.push_back(fmt::format(
-        "Warning: The chains agree, but the effective sample size is below {:g} for {}: means are known to about a "
-        "standard deviation divided by its square root, the 5 and 95 % quantiles less well. Raise Sample_Size",
-        settings.effectiveSize, few));
-  }
+  lines.push_back(fmt::format(
+      "Warning: The chains have not converged: R-hat is above {:g} for {}{}{}. The quantiles below are not those of "
+      "the "
+      "posterior yet. {}; where R-hat stays large, the posterior may have several peaks (more chains help: "
+      "Chain_Count) "
+      "or burn-in is too short (Burn_In_Share), which the states in _Chains.dat show; the run then begins anew",
+      settings.rHatLimit, apart, few.empty() ? "" : ", and ", fewText, kGoOn));
 }
 
 void appendCounts(const DreamSampler& sampler, std::vector<std::string>& lines) {
@@ -301,7 +306,7 @@ std::vector<std::string> formatPosterior(const DreamSettings& settings, const Dr
                                              countText(static_cast<std::size_t>(sampler.runs()), "model run"))};
   lines.push_back(endText(settings, sampler.end()));
   if (failures > 0) {
-    lines.push_back(fmt::format("{} failed or without a likelihood: their sets have likelihood 0 and were rejected",
+    lines.push_back(fmt::format("{} failed or had no likelihood: their sets have likelihood 0 and were rejected",
                                 countText(static_cast<std::size_t>(failures), "model run")));
   }
   if (summary == nullptr) {
@@ -310,9 +315,10 @@ std::vector<std::string> formatPosterior(const DreamSettings& settings, const Dr
     return lines;
   }
   lines.push_back(
-      fmt::format("Burn-in: the first {} generations ({:g} of Sample_Size), which are left out; the "
+      fmt::format("Burn-in: the first {} generations, {:g} of {} model runs, which are left out; the "
                   "posterior is {} states behind it",
-                  *sampler.burnIn(), settings.burnInShare, summary->draws));
+                  *sampler.burnIn(), settings.burnInShare,
+                  settings.burnInOf > 0 ? settings.burnInOf : settings.mostRuns, summary->draws));
   appendConvergence(settings, dimensions, *summary, lines);
   appendCounts(sampler, lines);
   appendQuantiles(dimensions, *summary, lines);

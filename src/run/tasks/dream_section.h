@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <map>
 #include <optional>
+#include <string>
 #include <string_view>
 #include <vector>
 
@@ -29,15 +30,18 @@ struct DreamSection {
   std::map<std::size_t, ErrorModelSettings>
       own;                     ///< of an output measure, by its number from 1; what it leaves open is as above
   std::int32_t objective = 0;  ///< of Likelihood = 'objective': its number; 0: the aggregate
+  std::string place;           ///< of the likelihood, "setup.kdx:14:9"
 };
 
 inline constexpr std::string_view kLikelihoodKeyword = "Likelihood";
+inline constexpr std::string_view kEffectiveSizeKeyword = "Effective_Size";
+inline constexpr std::string_view kDreamRefusal = "Error: Setting of DREAM invalid";
 inline constexpr std::string_view kErrorModelPrefix = "ERROR_MODEL_";
 
 const SettingSection<DreamSection>& dreamSection();
 const SettingSection<ErrorModelSettings>& errorModelSection();
 
-/// Reads the section DREAM of `section` and those inside it. Throws FatalError.
+/// Reads the section DREAM of `section` and those inside it, with `settings.sampler.mostRuns` given. Throws FatalError.
 void readDreamSection(const SetupSection& section, DreamSection& settings);
 
 }  // namespace mirevo
