@@ -11,6 +11,7 @@
 namespace mirevo::testing {
 namespace {
 
+using ::testing::AllOf;
 using ::testing::HasSubstr;
 using ::testing::Not;
 
@@ -59,8 +60,8 @@ Expected linearModel() {
 
 TEST(Dream, ThePosteriorOfALinearModelIsTheOneInClosedForm) {
   const ModelFolder folder;
-  const std::string dream = "Likelihood = 'normal'\n Error_Deviation = 3.0\n Effective_Size = 60\n R_Hat_Limit = 1.2";
-  const ProgramResult result = runProgram({writeDream(folder, {.maxEvaluations = 1500}, dream)});
+  const std::string dream = "Likelihood = 'normal'\n Error_Deviation = 3.0\n Effective_Size = 200";
+  const ProgramResult result = runProgram({writeDream(folder, {.maxEvaluations = 2800}, dream)});
   ASSERT_EQ(result.exitCode, 0) << result.error;
   const std::string chains = folder.read("basin_Chains.dat");
   const std::string posterior = folder.read("basin_Posterior.dat");
@@ -98,6 +99,26 @@ TEST(Dream, ThePosteriorOfALinearModelIsTheOneInClosedForm) {
     }
   }
   EXPECT_NEAR(width, 2.0 * 1.645 * 3.0, 0.8);
+}
+
+TEST(Dream, ThePriorIsTheDensityOfTheScaleOnWhichSetsAreSampled) {
+  const ModelFolder folder;
+  const std::string setup = writeDream(folder, {.maxEvaluations = 60}, "Likelihood = 'normal'\n Error_Deviation = 3.0");
+  folder.editSetup("Lower_Bound = 0.0\n      Upper_Bound = 10.0\n      Transformation_Type = 0",
+                   "Lower_Bound = 1.0\n      Upper_Bound = 9.0\n      Transformation_Type = 1");
+  folder.editSetup("[/DREAM]",
+                   "[/DREAM]\n[PARAMETER_1]\nDistribution = 'truncated normal'\nDistribution_Scale = 'model'\n"
+                   "Mean_Value = 5.0\nStandard_Deviation = 2.0\n[/PARAMETER_1]");
+  const ProgramResult run = runProgram({setup});
+  ASSERT_EQ(run.exitCode, 0) << run.error;
+  const ReadTable table = readDataTable(folder.read("basin_Chains.dat"));
+  for (const auto& row : table.rows) {
+    // Of ln a: the normal density between 1 and 9 times the derivative a; of b, from 0 to 5, uniform.
+    const double a = realCell(row[*table.column("a")]).value();
+    const double density = std::exp(-0.125 * (a - 5.0) * (a - 5.0)) / (2.0 * std::sqrt(2.0 * M_PI)) / std::erf(M_SQRT2);
+    EXPECT_NEAR(realCell(row[*table.column("Log_Prior")]).value(), std::log(density * a / 5.0), 1e-5);
+  }
+  EXPECT_GE(table.rows.size(), 60U);
 }
 
 TEST(Dream, AnInterruptedRunHasThePosteriorOfItsGenerationsAndGoesOnToTheSameBitsInOtherSlots) {
@@ -150,6 +171,7 @@ TEST(Dream, WhatDoesNotFitIsRefusedBeforeTheFirstModelRun) {
   struct Case {
     std::string dream;
     std::string message;
+    bool isOfSetup = true;  ///< else it takes the observations to see it
   };
   const std::vector<Case> cases{
       {"Likelihood = 'normal'\n Error_Deviation = 2.0, 1.0",
@@ -159,10 +181,10 @@ TEST(Dream, WhatDoesNotFitIsRefusedBeforeTheFirstModelRun) {
       {"Likelihood = 'normal'\n Error_Deviation = 0.0", "Error_Deviation: expected greater than 0, found 0"},
       {"Likelihood = 'heteroscedastic'\n Error_Share = -1.0, 1.0", "Error_Share: expected 0 or more, found -1"},
       {"Likelihood = 'AR(1)'\n Error_Correlation = 0.5, 1.0", "expected 0 to 0.9999, found 1"},
-      {"Likelihood = 'objective'\n Objective_Function = 2", "Objective_Function = 2: expected 0 to 1"},
+      {"Likelihood = 'objective'\n Objective_Function = 2", "Objective_Function: expected 0 to 1, found 2"},
       {"Likelihood = 'normal'\n [ERROR_MODEL_2]\n Likelihood = 'Student'\n [/ERROR_MODEL_2]",
        "ERROR_MODEL_2: expected the number of an output measure"},
-      {"Likelihood = 'Box-Cox'\n Box_Cox_Shift = -6.0", "expected a Box_Cox_Shift with which all observations"},
+      {"Likelihood = 'Box-Cox'\n Box_Cox_Shift = -6.0", "expected a Box_Cox_Shift with which all observations", false},
       {"Likelihood = 'normal'\n Effective_Size = 161.0", "expected at most 160, the part of Sample_Size"},
       // What no error model depends on would have its prior for a posterior.
       {"Likelihood = 'normal'\n Student_Freedom = 2.0, 50.0", "expected 'Student', or no Student_Freedom"},
@@ -176,11 +198,18 @@ TEST(Dream, WhatDoesNotFitIsRefusedBeforeTheFirstModelRun) {
   };
   const ModelFolder folder;
   for (const Case& own : cases) {
-    const ProgramResult run = runProgram({writeDream(folder, {.maxEvaluations = 200}, own.dream)});
+    SCOPED_TRACE(own.dream);
+    const std::string setup = writeDream(folder, {.maxEvaluations = 200}, own.dream);
+    if (own.isOfSetup) {
+      const ProgramResult check = runProgram({"--check", setup});
+      EXPECT_EQ(check.exitCode, 1);
+      EXPECT_THAT(check.error, AllOf(HasSubstr(own.message), HasSubstr("basin.kdx:")));
+      EXPECT_THAT(check.output, Not(HasSubstr("The model is run")));
+    }
+    const ProgramResult run = runProgram({setup});
     EXPECT_EQ(run.exitCode, 1);
     EXPECT_THAT(run.error, HasSubstr(own.message));
-    const bool isOfTask = own.dream.find("_2") != std::string::npos || own.dream.ends_with("= 2");
-    EXPECT_EQ(run.error.find("basin.kdx:") == std::string::npos, isOfTask) << run.error;
+    EXPECT_THAT(run.error, HasSubstr("basin.kdx:"));
     EXPECT_THAT(folder.read("basin.log"), Not(HasSubstr("No. 1 initiated")));
   }
   const ProgramResult small = runProgram({writeDream(folder, {.maxEvaluations = 39}, "Likelihood = 'normal'")});
@@ -271,12 +300,18 @@ TEST(Dream, MoreRunsAndOtherLimitsGoOnWithTheSameChains) {
   EXPECT_EQ(runProgram({writeDream(folder, {.maxEvaluations = 200, .restart = 1}, dream)}).exitCode, 1);
 }
 
-TEST(Dream, ARunThatFailsTooOftenTellsWhatHelps) {
+TEST(Dream, ARunThatFailsTooOftenTellsWhatHelpsAndGoesOnWithALargerLimit) {
   const ModelFolder folder;
-  const RunSettings settings{.maxEvaluations = 100, .modelArguments = "--fail-above 3"};
-  const ProgramResult run = runProgram({writeDream(folder, settings, "Likelihood = 'normal'")});
+  const std::string dream = "Likelihood = 'normal'\n Error_Deviation = 3.0";
+  RunSettings settings{.maxEvaluations = 80, .restart = 1};
+  folder.useScript("echo . >> '" + folder / "count" + "'; test $(wc -l < '" + folder / "count" + "') -gt 9 || exit 3");
+  const ProgramResult run = runProgram({writeDream(folder, settings, dream)});
   EXPECT_EQ(run.exitCode, 1);
   EXPECT_THAT(run.error, HasSubstr("whose violation needs no model run and is no failure here"));
+  settings.maxEvaluations = 120;
+  const ProgramResult more = runProgram({writeDream(folder, settings, dream)});
+  EXPECT_EQ(more.exitCode, 0) << more.error;
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("9 model runs failed or had no likelihood"));
 }
 
 }  // namespace

@@ -8,9 +8,12 @@
 #include <fmt/format.h>
 
 #include "common/text.h"
+#include "measures/period_series.h"
 
 namespace mirevo {
 namespace {
+
+constexpr std::string_view kObjectiveKeyword = "Objective_Function";
 
 /// The value of the enumerator with this name, of a coded keyword whose codes are names in the order of the
 /// enumerators.
@@ -23,7 +26,6 @@ Enum named(const CodeName (&names)[Count], const SetupValue& value) {
   return static_cast<Enum>(found);
 }
 
-constexpr std::string_view kObjectiveKeyword = "Objective_Function";
 constexpr std::string_view kErrorModelRefusal = "Error: Error model of DREAM invalid";
 
 constexpr char kDeviationMeaning[] =
@@ -231,6 +233,34 @@ void refuseUnread(const SetupSection& section, const ErrorModelSettings& written
   }
 }
 
+/// What depends on other settings of the section, or on what the likelihood is of.
+void checkDream(const SetupSection& dream, const DreamSection& settings, std::size_t objectiveCount,
+                bool comparesSeries) {
+  const DreamSettings& sampler = settings.sampler;
+  const double behindBurnIn = sampler.mostRuns - sampler.burnInRuns();
+  if (dream.isWritten(kEffectiveSizeKeyword) && sampler.effectiveSize > behindBurnIn) {
+    dream.refuse(kDreamRefusal, kEffectiveSizeKeyword,
+                 fmt::format("expected at most {:g}, the part of Sample_Size behind burn-in, found {:g}", behindBurnIn,
+                             sampler.effectiveSize));
+  }
+  if (settings.errors.form == LikelihoodForm::objective) {
+    if (static_cast<std::size_t>(settings.objective) > objectiveCount) {
+      dream.refuse(kDreamLikelihoodRefusal, kObjectiveKeyword,
+                   fmt::format("expected 0 to {}, found {}", objectiveCount, settings.objective));
+    }
+    return;
+  }
+  if (!comparesSeries) {
+    dream.refuse(kDreamLikelihoodRefusal, kLikelihoodKeyword,
+                 "no objective function compares time series: expected 'objective'");
+  }
+  if (dream.isWritten(kObjectiveKeyword)) {
+    dream.refuse(kErrorModelRefusal, kObjectiveKeyword,
+                 fmt::format("{} = '{}' does not depend on it: expected 'objective', or no {}", kLikelihoodKeyword,
+                             nameOf(*settings.errors.form), kObjectiveKeyword));
+  }
+}
+
 }  // namespace
 
 const SettingSection<DreamSection>& dreamSection() {
@@ -252,25 +282,30 @@ const SettingSection<ErrorModelSettings>& errorModelSection() {
   return section;
 }
 
-void readDreamSection(const SetupSection& section, DreamSection& settings) {
+std::vector<std::size_t> measuresOfLikelihood(std::span<const OutputMeasure> measures,
+                                              std::span<const ObjectiveFunction> objectives) {
+  std::vector<std::size_t> found;
+  for (std::size_t m = 0; m < measures.size(); ++m) {
+    if (measures[m].interfaceType != InterfaceType::timeSeries) continue;
+    const bool isCounted = std::ranges::any_of(objectives, [m](const ObjectiveFunction& objective) {
+      return std::ranges::any_of(objective.measures, [m](const MeasureTerm& term) { return term.index == m; });
+    });
+    const auto isSame = [&](std::size_t other) { return isSamePair(measures[m], measures[other]); };
+    if (isCounted && std::ranges::none_of(found, isSame)) found.push_back(m);
+  }
+  return found;
+}
+
+void readDreamSection(const SetupSection& section, std::span<const OutputMeasure> measures,
+                      std::span<const ObjectiveFunction> objectives, DreamSection& settings) {
   constexpr std::size_t kMostMeasures = 10'000;
   const SetupSection dream = section.open("DREAM");
   dream.read(dreamSection(), settings);
-  const DreamSettings& sampler = settings.sampler;
-  const double behindBurnIn = sampler.mostRuns - sampler.burnInRuns();
-  if (dream.isWritten(kEffectiveSizeKeyword) && sampler.effectiveSize > behindBurnIn) {
-    dream.refuse(kDreamRefusal, kEffectiveSizeKeyword,
-                 fmt::format("expected at most {:g}, the part of Sample_Size behind burn-in, found {:g}", behindBurnIn,
-                             sampler.effectiveSize));
-  }
-  checkTerms(dream, settings.errors);
   settings.place = dream.location(kLikelihoodKeyword);
+  checkTerms(dream, settings.errors);
+  const std::vector<std::size_t> compared = measuresOfLikelihood(measures, objectives);
+  checkDream(dream, settings, objectives.size(), !compared.empty());
   const LikelihoodForm form = *settings.errors.form;
-  if (form != LikelihoodForm::objective && dream.isWritten(kObjectiveKeyword)) {
-    dream.refuse(kErrorModelRefusal, kObjectiveKeyword,
-                 fmt::format("{} = '{}' does not depend on it: expected 'objective', or no {}", kLikelihoodKeyword,
-                             nameOf(form), kObjectiveKeyword));
-  }
   ErrorModels models{{form, &settings.errors}};
   for (std::size_t n = 1; n <= kMostMeasures; ++n) {
     if (!dream.has(fmt::format("{}{}", kErrorModelPrefix, n))) continue;
@@ -281,6 +316,9 @@ void readDreamSection(const SetupSection& section, DreamSection& settings) {
     if (model.form == LikelihoodForm::objective || form == LikelihoodForm::objective) {
       own.refuse(kErrorModelRefusal, kLikelihoodKeyword,
                  "expected no error model of an output measure where the likelihood is an objective function");
+    }
+    if (std::ranges::find(compared, n - 1) == compared.end()) {
+      dream.refuse(kDreamLikelihoodRefusal, fmt::format("{}{}", kErrorModelPrefix, n), std::string(kErrorModelMeasure));
     }
     models.emplace_back(model.form.value_or(form), &model);
     refuseUnread(own, model, settings.errors, {models.back()});

@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <map>
 #include <optional>
+#include <span>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -11,6 +12,8 @@
 #include "algorithms/bayes/dream_sampler.h"
 #include "algorithms/bayes/likelihoods.h"
 #include "common/settings/keyword_row.h"
+#include "measures/objective_functions.h"
+#include "measures/output_measure.h"
 #include "run/access/setup_access.h"
 
 namespace mirevo {
@@ -36,12 +39,23 @@ struct DreamSection {
 inline constexpr std::string_view kLikelihoodKeyword = "Likelihood";
 inline constexpr std::string_view kEffectiveSizeKeyword = "Effective_Size";
 inline constexpr std::string_view kDreamRefusal = "Error: Setting of DREAM invalid";
+inline constexpr std::string_view kDreamLikelihoodRefusal = "Error: Likelihood of DREAM invalid";
 inline constexpr std::string_view kErrorModelPrefix = "ERROR_MODEL_";
+inline constexpr std::string_view kErrorModelMeasure =
+    "expected the number of an output measure that compares series and enters an objective function (of several that "
+    "compare the same, the first)";
 
 const SettingSection<DreamSection>& dreamSection();
 const SettingSection<ErrorModelSettings>& errorModelSection();
 
-/// Reads the section DREAM of `section` and those inside it, with `settings.sampler.mostRuns` given. Throws FatalError.
-void readDreamSection(const SetupSection& section, DreamSection& settings);
+/// The output measures, 0-based, of whose errors a likelihood is: every pair of series that enters an objective
+/// function, once.
+std::vector<std::size_t> measuresOfLikelihood(std::span<const OutputMeasure> measures,
+                                              std::span<const ObjectiveFunction> objectives);
+
+/// Reads the section DREAM of `section` and those inside it, with `settings.sampler.mostRuns` given. Throws FatalError,
+/// also where the likelihood does not fit the output measures and objective functions.
+void readDreamSection(const SetupSection& section, std::span<const OutputMeasure> measures,
+                      std::span<const ObjectiveFunction> objectives, DreamSection& settings);
 
 }  // namespace mirevo

@@ -16,14 +16,6 @@ namespace mirevo {
 namespace {
 
 constexpr double kInfinity = std::numeric_limits<double>::infinity();
-constexpr const char* kRefusal = "Error: Likelihood of DREAM invalid";
-
-bool isInObjective(const TaskContext& context, std::size_t measure) {
-  return std::ranges::any_of(context.objectives, [measure](const ObjectiveFunction& objective) {
-    return std::ranges::any_of(objective.measures,
-                               [measure](const MeasureTerm& term) { return term.index == measure; });
-  });
-}
 
 /// The value of a term with one number, or its bounds; the default where the setup says nothing.
 std::vector<double> numbersOf(ErrorTerm term, const ErrorModelSettings& common, const ErrorModelSettings* own,
@@ -42,10 +34,6 @@ DreamTarget::DreamTarget(const DreamSection& settings, const ParameterDistributi
     : prior_(prior), lower_(context.space.lower), upper_(context.space.upper) {
   if (settings.errors.form == LikelihoodForm::objective) {
     objective_ = static_cast<std::size_t>(settings.objective);
-    if (*objective_ > context.objectives.size()) {
-      fatalError(kRefusal,
-                 fmt::format("Objective_Function = {}: expected 0 to {}", *objective_, context.objectives.size()));
-    }
   } else {
     addSeries(settings, context);
   }
@@ -55,18 +43,14 @@ DreamTarget::DreamTarget(const DreamSection& settings, const ParameterDistributi
   }
 }
 
-/// Every pair of series that enters an objective function, once.
 void DreamTarget::addSeries(const DreamSection& settings, const TaskContext& context) {
   std::size_t first = 0;
-  std::vector<std::size_t> taken;
+  const std::vector<std::size_t> compared = measuresOfLikelihood(context.measures, context.objectives);
   for (std::size_t k = 0; k < context.observedSeries.size(); ++k) {
     const ObservedSeries& observed = context.observedSeries[k];
     const std::size_t begin = std::exchange(first, first + 2 * observed.values.size());  // values, then their units
     const OutputMeasure& measure = context.measures[observed.measure];
-    const bool isRepeated =
-        std::ranges::any_of(taken, [&](std::size_t other) { return isSamePair(measure, context.measures[other]); });
-    if (!isInObjective(context, observed.measure) || isRepeated) continue;
-    taken.push_back(observed.measure);
+    if (std::ranges::find(compared, observed.measure) == compared.end()) continue;
     const auto found = settings.own.find(observed.measure + 1);
     const ErrorModelSettings* const own = found == settings.own.end() ? nullptr : &found->second;
     const LikelihoodForm form = own != nullptr && own->form ? *own->form : *settings.errors.form;
@@ -76,15 +60,11 @@ void DreamTarget::addSeries(const DreamSection& settings, const TaskContext& con
     series_.push_back({measure.name, k, begin, std::move(errors), count, neutralErrors(), {}});
     addTerms(settings, own, form, series_.back());
   }
+  // Two measures that compare the same, by the number and by the name of an item, are told apart until here.
   for (const auto& [number, own] : settings.own) {
-    if (std::ranges::find(taken, number - 1) != taken.end()) continue;
-    fatalError(kRefusal, fmt::format("{}{}: expected the number of an output measure that compares series and enters "
-                                     "an objective function (of several that compare the same, the first)",
-                                     kErrorModelPrefix, number));
+    if (std::ranges::find(compared, number - 1) != compared.end()) continue;
+    fatalError(kDreamLikelihoodRefusal, fmt::format("{}{}: {}", kErrorModelPrefix, number, kErrorModelMeasure));
   }
-  if (!series_.empty()) return;
-  fatalError(kRefusal, fmt::format("{}: no objective function compares time series: expected {} = 'objective'",
-                                   settings.place, kLikelihoodKeyword));
 }
 
 void DreamTarget::addTerms(const DreamSection& settings, const ErrorModelSettings* own, LikelihoodForm form,
@@ -94,7 +74,7 @@ void DreamTarget::addTerms(const DreamSection& settings, const ErrorModelSetting
   const std::vector<double> lambda = numbersOf(kLambda, common, own, form);
   if (lambda != std::vector<double>{1.0}) {
     if (const auto value = series.errors.untransformable()) {
-      fatalError(kRefusal,
+      fatalError(kDreamLikelihoodRefusal,
                  fmt::format("{}: the observation {:g} of {} has no Box-Cox transformation: expected a Box_Cox_Shift "
                              "with which all observations are above 0",
                              settings.place, *value, quotedForMessage(measure)));
@@ -109,7 +89,7 @@ void DreamTarget::addTerms(const DreamSection& settings, const ErrorModelSetting
       const double other = series.errors.deviation(lambda.back());
       numbers = {1e-3 * std::min(one, other), 10.0 * std::max(one, other)};
       if (!(numbers.front() > 0.0)) {
-        fatalError(kRefusal,
+        fatalError(kDreamLikelihoodRefusal,
                    fmt::format("{}: the observations of {} do not vary: expected {} with a value or with bounds",
                                settings.place, quotedForMessage(measure), row.keyword));
       }

@@ -13,6 +13,7 @@
 #include "run/tasks/distribution_reading.h"
 #include "run/tasks/posterior_bands.h"
 #include "run/tasks/sample_bands.h"
+#include "run/tasks/simulated_room.h"
 
 namespace mirevo {
 namespace {
@@ -55,7 +56,7 @@ void DreamTask::read(const TaskReading& reading) {
   }
   refuseImpossiblePriors(reading, section);
   dream.sampler.mostRuns = settings.sampleSize;
-  readDreamSection(section, dream);
+  readDreamSection(section, reading.measures, reading.objectives, dream);
   checkSize(reading, section);
 }
 
@@ -198,6 +199,8 @@ TaskOutcome DreamTask::run(const TaskContext& context) {
   target_ = std::make_unique<DreamTarget>(dream, prior_, context);
   for (const std::string& line : target_->descriptionLines()) context.log.line(line);
   logBandTimes(context, settings);
+  logRoomOfSimulatedValues(context, facts().resultFiles.simulatedValues, static_cast<std::size_t>(settings.sampleSize),
+                           keptPrecision());
   sampler_ = std::make_unique<DreamSampler>(dream.sampler, target_->problem(context), randomSeed);
   bool wasBurningIn = true;
   std::size_t checks = 0;

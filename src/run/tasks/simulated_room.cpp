@@ -17,11 +17,11 @@ std::string sizeText(std::uintmax_t bytes) {
 
 }  // namespace
 
-void logRoomOfSimulatedValues(const TaskContext& context, const RunFile& file, std::size_t sets) {
+void logRoomOfSimulatedValues(const TaskContext& context, const RunFile& file, std::size_t sets,
+                              SeriesPrecision precision) {
   constexpr std::uintmax_t kMuch = 100'000'000;
   const std::string path = runFilePath(context.filePrefix, file);
-  const std::uintmax_t bytes =
-      sets * sizeof(double) * simulatedValueCount(context.observedSeries, SeriesPrecision::single);
+  const std::uintmax_t bytes = sets * sizeof(double) * simulatedValueCount(context.observedSeries, precision);
   std::error_code failed;
   const std::uintmax_t size = std::filesystem::file_size(path, failed);
   const std::uintmax_t written = failed ? 0 : std::min(size, bytes);

@@ -168,6 +168,35 @@ TEST(DreamSampler, ARejectedProposalRepeatsTheStateAndNeverEntersThePosterior) {
   EXPECT_LT(accepted, proposals);
 }
 
+TEST(DreamSampler, AProposalIsAcceptedWithTheRatioOfTheDensities) {
+  std::vector<double> proposed;
+  DreamProblem problem = sampledFunction(times(3, -10.0), times(3, 10.0), lnStandardNormal);
+  const auto evaluate = problem.evaluate;
+  problem.evaluate = [&](std::span<const DreamProposal> proposals) {
+    for (const DreamProposal& proposal : proposals) proposed.push_back(lnStandardNormal(proposal.point));
+    return evaluate(proposals);
+  };
+  DreamSettings settings = untilBudget(20'000);
+  settings.snookerShare = 0.0;  // whose acceptance has a further factor
+  const DreamSampler sampler = sampled(settings, std::move(problem));
+  double excess = 0.0;
+  double variance = 0.0;
+  for (std::size_t g = *sampler.burnIn(); g < sampler.history().generations(); ++g) {
+    for (std::size_t c = 0; c < 4; ++c) {
+      const double ratio = std::exp(proposed[4 * g + c] - sampler.history().at(g - 1, c).logLikelihood);
+      const bool isAccepted = sampler.history().at(g, c).accepted;
+      if (ratio >= 1.0) {
+        EXPECT_TRUE(isAccepted);
+        continue;
+      }
+      excess += (isAccepted ? 1.0 : 0.0) - ratio;
+      variance += ratio * (1.0 - ratio);
+    }
+  }
+  EXPECT_GT(variance, 500.0);
+  EXPECT_LT(std::abs(excess), 4.0 * std::sqrt(variance));
+}
+
 TEST(DreamSampler, RunsThatFailOrMayNotBeMadeAreNoPartOfThePosterior) {
   // A half normal: where x < 0 runs fail; y < 0 is not allowed, and no run is made there.
   const auto failing = [](std::span<const double> x) {

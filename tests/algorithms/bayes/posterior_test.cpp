@@ -1,0 +1,106 @@
+#include "algorithms/bayes/posterior.h"
+
+#include <cmath>
+
+#include <fmt/format.h>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "algorithms/bayes/sampled_function.h"
+
+namespace mirevo {
+namespace {
+
+/// Chains of ln x ~ N(0, 0.5^2) and an error parameter, shown on their own scales.
+struct ShownChains {
+  ShownChains() {
+    const auto density = [](std::span<const double> x) { return -2.0 * x[0] * x[0] - 0.5 * x[1] * x[1]; };
+    DreamProblem problem = sampledFunction({-6.0, -6.0}, {6.0, 6.0}, density);
+    problem.modelParameterCount = 1;
+    settings = untilBudget(4'000);
+    settings.effectiveSize = 200.0;
+    chains.emplace(sampled(settings, std::move(problem)));
+  }
+  std::vector<std::string> report(const PosteriorSummary* summary, int failures = 0) const {
+    return formatPosterior(settings, *chains, dimensions, summary, failures, "basin_SampleCorrelation.dat");
+  }
+
+  DreamSettings settings;
+  std::optional<DreamSampler> chains;
+  ShownDimensions dimensions{{"K", "sigma0 of flow"}, 1, [](std::span<const double> x) {
+                               return std::vector{std::exp(x[0]), x[1]};
+                             }};
+  std::vector<std::vector<double>> prior{{-6.0, -6.0}, {0.0, 0.0}, {6.0, 6.0}};
+};
+
+// A proposal that was rejected is in no row, its state is there once more; the rate is of proposals that became states.
+TEST(Posterior, IsOfTheStatesBehindBurnInAndTheAcceptanceRateOfTheirProposals) {
+  const ShownChains shown;
+  const auto summary = summarisePosterior(*shown.chains, shown.dimensions, shown.prior);
+  ASSERT_TRUE(summary);
+  const DataTable table = chainsTable(*shown.chains, shown.dimensions);
+  std::size_t rows = 0;
+  std::size_t accepted = 0;
+  double mean = 0.0;
+  double square = 0.0;
+  for (std::size_t i = 0; i < table.rows.size(); ++i) {
+    if (std::get<std::int64_t>(table.rows[i][2]) == 1) continue;
+    ++rows;
+    if (std::get<std::int64_t>(table.rows[i][4]) == 1) ++accepted;
+    const double value = table.realColumns[2][i];
+    EXPECT_NEAR(table.realColumns[0][i],
+                -2.0 * std::log(value) * std::log(value) - 0.5 * std::pow(table.realColumns[3][i], 2), 1e-12);
+    mean += value;
+    square += value * value;
+  }
+  const auto count = static_cast<double>(rows);
+  mean /= count;
+  EXPECT_LT(rows, table.rows.size());
+  EXPECT_EQ(summary->draws, rows);
+  EXPECT_NEAR(summary->dimensions[0].mean, mean, 1e-9);
+  EXPECT_NEAR(summary->dimensions[0].standardDeviation, std::sqrt((square - count * mean * mean) / (count - 1.0)),
+              1e-9);
+  // The mean of a lognormal quantity is not that of its logarithm, which is 0.
+  EXPECT_NEAR(mean, std::exp(0.125), 4.0 * 0.6 / std::sqrt(summary->dimensions[0].effectiveSize));
+  EXPECT_NEAR(summary->mostProbable[0], 1.0, 0.1);
+
+  const double rate = static_cast<double>(accepted) / count;
+  EXPECT_GT(rate, 0.2);
+  EXPECT_LT(rate, 0.5);
+  EXPECT_THAT(shown.report(&*summary),
+              ::testing::Contains(::testing::StartsWith(
+                  fmt::format("Acceptance rate behind burn-in: {:.1f} % of {} proposals", 100.0 * rate, rows))));
+}
+
+TEST(Posterior, IsSaidNotToBeThereOrNotToHaveConverged) {
+  ShownChains shown;
+  const std::vector<std::string> none = shown.report(nullptr, 1);
+  EXPECT_THAT(none, ::testing::Contains(::testing::StartsWith("1 model run failed or had no likelihood")));
+  EXPECT_THAT(none, ::testing::Contains(::testing::HasSubstr("No posterior: there are fewer than 4 generations")));
+  auto summary = summarisePosterior(*shown.chains, shown.dimensions, shown.prior);
+  EXPECT_THAT(shown.report(&*summary), ::testing::Contains(::testing::HasSubstr("The chains have converged")));
+  summary->dimensions[1].rHat = 1.3;
+  EXPECT_THAT(
+      shown.report(&*summary),
+      ::testing::Contains(::testing::HasSubstr("have not converged: R-hat is above 1.05 for sigma0 of flow (1.3)")));
+  summary->dimensions[1].rHat = std::nan("");
+  EXPECT_THAT(shown.report(&*summary), ::testing::Contains(::testing::HasSubstr("have not converged")));
+  summary->dimensions[1].rHat = 1.0;
+  summary->dimensions[0].effectiveSize = 90.0;
+  EXPECT_THAT(shown.report(&*summary),
+              ::testing::Contains(::testing::HasSubstr("the effective sample size is below 200 for K (90)")));
+  // One verdict, whatever the chains lack.
+  for (const double rHat : {1.0, 1.3}) {
+    summary->dimensions[1].rHat = rHat;
+    int verdicts = 0;
+    for (const std::string& line : shown.report(&*summary)) {
+      if (line.find("converged") == std::string::npos && line.find("chains agree") == std::string::npos) continue;
+      EXPECT_THAT(line, ::testing::StartsWith("Warning: The chains have not converged: "));
+      ++verdicts;
+    }
+    EXPECT_EQ(verdicts, 1);
+  }
+}
+
+}  // namespace
+}  // namespace mirevo
