@@ -246,6 +246,19 @@ TEST(Dream, PriorsThatHaveNothingWithinTheBoundsAreRefusedAndOthersAreCutThere) 
   EXPECT_THAT(equal.error, HasSubstr("Upper_Bound: expected more than 4 for a parameter with a density"));
 }
 
+TEST(Dream, ConstraintsThatNoSetMeetsAreFoundByCheck) {
+  const ModelFolder folder;
+  const std::string setup = writeDream(folder, {.maxEvaluations = 200}, "Likelihood = 'normal'");
+  folder.editSetup(
+      "TqSEKdxListItemCount = 0\n    [/INTERNAL_CONSTRAINTS]",
+      "TqSEKdxListItemCount = 1\n      [CONSTRAINT_1]\n        Left_Equation = 'a + b'\n        "
+      "Right_Equation = '-1.0'\n        Logical_Operator = 1\n      [/CONSTRAINT_1]\n    [/INTERNAL_CONSTRAINTS]");
+  const ProgramResult check = runProgram({"--check", setup});
+  EXPECT_EQ(check.exitCode, 1);
+  EXPECT_THAT(check.error, AllOf(HasSubstr("No parameter set found that satisfies the constraints"),
+                                 HasSubstr("basin.kdx:"), HasSubstr("drawn from the prior of DREAM")));
+}
+
 TEST(Dream, TheMostCompleteOfTheFirstRunsTellsWhichObservationsCount) {
   struct Case {
     const char* condition;  ///< of the model runs whose series is cut off

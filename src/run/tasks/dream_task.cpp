@@ -149,6 +149,29 @@ void DreamTask::continueFrom(const std::vector<EarlierSearch>& searches) {
   dream.sampler.leastRuns = searches.back().lastEvaluation;
 }
 
+void DreamTask::requireSets(const SearchSpace& space, const Feasibility& feasibility) const {
+  constexpr int kMostDraws = 100'000;
+  ChainRandom random(1);
+  std::vector<double> unit(prior_.size());
+  std::string reason = "they lie outside the bounds";
+  for (int k = 0; k < kMostDraws; ++k) {
+    for (double& value : unit) value = random.uniform();
+    const ParameterSet set = prior_.setAt(unit);
+    bool isInside = true;
+    for (std::size_t j = 0; j < set.size(); ++j) {
+      isInside = isInside && set[j] >= space.lower[j] && set[j] <= space.upper[j];
+    }
+    if (!isInside) continue;
+    const auto violation = feasibility.violation(set);
+    if (!violation) return;
+    reason = *violation;
+  }
+  fatalError(
+      feasibility.isTested() ? feasibility.noSetMessage()
+                             : "Error: No parameter set found in the prior that can be run",
+      fmt::format("{}: none of {} sets drawn from the prior of DREAM can be run: {}", dream.place, kMostDraws, reason));
+}
+
 TaskOutcome DreamTask::outcomeOf(const TaskContext& context) const {
   TaskOutcome outcome{std::string(kEndOfTask)};
   const ShownDimensions dimensions = target_->shown(context.space);

@@ -29,6 +29,7 @@ class DreamTask final : public Task {
   SeriesPrecision keptPrecision() const override { return SeriesPrecision::exact; }
   std::optional<KeptSteps> keptSteps() const override;
   bool usesExactMeasures() const override { return true; }
+  void requireSets(const SearchSpace& space, const Feasibility& feasibility) const override;
   TaskOutcome run(const TaskContext& context) override;
   /// Of the generations that are complete.
   std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const override;
