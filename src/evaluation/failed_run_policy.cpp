@@ -20,7 +20,7 @@ void FailedRunPolicy::countFailure(int number, const EvaluationFailure& failure)
       "failed evaluations: {}{}; at most {} may fail, a tenth of the {} planned\nthe last of them, No. {}: {}",
       failedCount_, notRun, limit_, planned_, number, failure.reason);
   for (const std::string& line : failure.lastOutput) detail += "\n| " + line;
-  fatalError("Error: Unable to continue. No of failed simulations too high.", detail);
+  fatalError(kTooManyFailures, detail);
 }
 
 }  // namespace mirevo

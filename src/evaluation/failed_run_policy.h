@@ -4,6 +4,9 @@
 
 namespace mirevo {
 
+/// The message of a run that ends because of them.
+inline constexpr const char* kTooManyFailures = "Error: Unable to continue. No of failed simulations too high.";
+
 /// Counts the failed evaluations of a run against their limit, a tenth (rounded down) of the evaluations planned.
 class FailedRunPolicy final {
  public:

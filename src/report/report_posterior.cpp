@@ -307,8 +307,9 @@ std::vector<std::string> adviceOf(const ReportedPosterior& posterior, Convergenc
   }
   if (!posterior.isUnfinished) {
     advice.emplace_back(
-        "A run with a larger Sample_Size begins anew (Restart = 0), as burn-in is a share of it. Bounds or priors that "
-        "are narrower around good sets, and a likelihood that fits the errors, shorten the way");
+        "Bounds or priors that are narrower around good sets, and a likelihood that fits the errors, shorten the way; "
+        "a run "
+        "with other ones begins anew");
   }
   return advice;
 }

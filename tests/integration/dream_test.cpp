@@ -1,6 +1,8 @@
+#include <algorithm>
 #include <cmath>
 #include <sstream>
 
+#include <fmt/format.h>
 #include <gmock/gmock.h>
 
 #include "common/data_table.h"
@@ -199,7 +201,7 @@ TEST(Dream, AnObjectiveFunctionMayBeTheLikelihoodAndFailedRunsHaveNone) {
     EXPECT_NEAR(-logLikelihood, realCell(results.rows[number - 1][*results.column("flow")]).value(), 1e-5);
     EXPECT_LE(realCell(row[*table.column("a")]).value(), 9.9);
   }
-  EXPECT_THAT(folder.read("basin.log"), HasSubstr("their sets have likelihood 0 and were rejected"));
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("had no likelihood: their sets have likelihood 0 and were rejected"));
   EXPECT_FALSE(folder.exists("basin_TotalBand_1.csv"));
 }
 
@@ -214,11 +216,23 @@ TEST(Dream, WhatDoesNotFitIsRefusedBeforeTheFirstModelRun) {
        "expected a lower bound below the upper one, found 2 and 1"},
       {"Likelihood = 'normal'\n Error_Deviation = 1.0, 2.0, 3.0",
        "one number (a fixed value) or two (bounds), found 3"},
+      {"Likelihood = 'normal'\n Error_Deviation = 0.0", "Error_Deviation: expected greater than 0, found 0"},
+      {"Likelihood = 'heteroscedastic'\n Error_Share = -1.0, 1.0", "Error_Share: expected 0 or more, found -1"},
       {"Likelihood = 'AR(1)'\n Error_Correlation = 0.5, 1.0", "expected 0 to 0.9999, found 1"},
       {"Likelihood = 'objective'\n Objective_Function = 2", "Objective_Function: expected 0 to 1, found 2"},
       {"Likelihood = 'normal'\n [ERROR_MODEL_2]\n Likelihood = 'Student'\n [/ERROR_MODEL_2]",
        "ERROR_MODEL_2: expected the number of an output measure"},
       {"Likelihood = 'Box-Cox'\n Box_Cox_Shift = -6.0", "expected a Box_Cox_Shift with which all observations", false},
+      {"Likelihood = 'normal'\n Effective_Size = 161.0", "expected at most 160, the part of Sample_Size"},
+      // What no error model depends on would have its prior for a posterior.
+      {"Likelihood = 'normal'\n Student_Freedom = 2.0, 50.0", "expected 'Student', or no Student_Freedom"},
+      {"Likelihood = 'Student'\n Error_Kurtosis = 0.5", "expected 'generalised', or no Error_Kurtosis"},
+      {"Likelihood = 'AR(1)'\n Error_Skewness = 0.5, 2.0", "expected 'generalised', or no Error_Skewness"},
+      {"Likelihood = 'objective'\n Error_Deviation = 1.0, 2.0", "expected the likelihood of a series, or no Error_D"},
+      {"Likelihood = 'normal'\n Box_Cox_Shift = 1.0", "expected 'Box-Cox', or a Box_Cox_Lambda other than 1, or no"},
+      {"Likelihood = 'normal'\n Objective_Function = 1", "expected 'objective', or no Objective_Function"},
+      {"Likelihood = 'Student'\n [ERROR_MODEL_1]\n Likelihood = 'normal'\n Student_Freedom = 5.0\n [/ERROR_MODEL_1]",
+       "expected 'Student', or no Student_Freedom"},
   };
   const ModelFolder folder;
   for (const Case& own : cases) {
@@ -233,10 +247,122 @@ TEST(Dream, WhatDoesNotFitIsRefusedBeforeTheFirstModelRun) {
     const ProgramResult run = runProgram({setup});
     EXPECT_EQ(run.exitCode, 1);
     EXPECT_THAT(run.error, HasSubstr(own.message));
+    EXPECT_THAT(run.error, HasSubstr("basin.kdx:"));
     EXPECT_THAT(folder.read("basin.log"), Not(HasSubstr("No. 1 initiated")));
   }
   const ProgramResult small = runProgram({writeDream(folder, {.maxEvaluations = 39}, "Likelihood = 'normal'")});
   EXPECT_THAT(small.error, HasSubstr("expected 10 model runs for each of the 4 chains or more, found 39"));
+}
+
+TEST(Dream, PriorsThatHaveNothingWithinTheBoundsAreRefusedAndOthersAreCutThere) {
+  const ModelFolder folder;
+  const std::string dream = "Likelihood = 'normal'\n Error_Deviation = 3.0";
+  const auto withPrior = [&](const std::string& mean, const std::string& deviation) {
+    std::string text = folder.read(writeDream(folder, {.maxEvaluations = 200}, dream).substr(folder.path().size() + 1));
+    text.insert(text.find("[DREAM]"), "[PARAMETER_1]\n Mean_Value = " + mean + "\n Standard_Deviation = " + deviation +
+                                          "\n [/PARAMETER_1]\n");
+    return folder.write("basin.kdx", text);
+  };
+  const ProgramResult outside = runProgram({withPrior("50.0", "1.0")});
+  EXPECT_EQ(outside.exitCode, 1);
+  EXPECT_THAT(outside.error, HasSubstr("the prior of a has a probability of 0 between the bounds 0 and 10"));
+  EXPECT_THAT(outside.error, HasSubstr("basin.kdx:"));
+
+  const ProgramResult cut = runProgram({withPrior("5.0", "100.0")});
+  ASSERT_EQ(cut.exitCode, 0) << cut.error;
+  const std::string posterior = folder.read("basin_Posterior.dat");
+  EXPECT_NEAR(cell(posterior, "a", "Prior 5 %"), 0.5, 0.1);  // of one that is nearly flat from 0 to 10
+  EXPECT_NEAR(cell(posterior, "a", "Prior 95 %"), 9.5, 0.1);
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("PARAMETER_1: a, mean 5, standard deviation 100"));
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("% of the values drawn are outside"));
+
+  writeDream(folder, {.maxEvaluations = 200}, dream);
+  folder.editSetup("Lower_Bound = 0.0", "Lower_Bound = 4.0");
+  folder.editSetup("Upper_Bound = 10.0", "Upper_Bound = 4.0");
+  const ProgramResult equal = runProgram({folder / "basin.kdx"});
+  EXPECT_THAT(equal.error, HasSubstr("Lower bound equal to upper bound for parameter a"));
+  EXPECT_THAT(equal.error, HasSubstr("Upper_Bound: expected more than 4 for a parameter with a density"));
+}
+
+TEST(Dream, ConstraintsThatNoSetMeetsAreFoundByCheck) {
+  const ModelFolder folder;
+  const std::string setup = writeDream(folder, {.maxEvaluations = 200}, "Likelihood = 'normal'");
+  folder.editSetup(
+      "TqSEKdxListItemCount = 0\n    [/INTERNAL_CONSTRAINTS]",
+      "TqSEKdxListItemCount = 1\n      [CONSTRAINT_1]\n        Left_Equation = 'a + b'\n        "
+      "Right_Equation = '-1.0'\n        Logical_Operator = 1\n      [/CONSTRAINT_1]\n    [/INTERNAL_CONSTRAINTS]");
+  const ProgramResult check = runProgram({"--check", setup});
+  EXPECT_EQ(check.exitCode, 1);
+  EXPECT_THAT(check.error, AllOf(HasSubstr("No parameter set found that satisfies the constraints"),
+                                 HasSubstr("basin.kdx:"), HasSubstr("drawn from the prior of DREAM")));
+}
+
+TEST(Dream, TheMostCompleteOfTheFirstRunsTellsWhichObservationsCount) {
+  struct Case {
+    const char* condition;  ///< of the model runs whose series is cut off
+    const char* told;
+    bool firstCounts = false;
+  };
+  const Case cases[] = {
+      {"test $(wc -l < '{}') -eq 1", "The likelihood is of all 365 observations of flow", false},
+      {"test -e '{}'", "The likelihood is of 20 of the 365 observations of flow", true},
+  };
+  for (const Case& own : cases) {
+    const ModelFolder folder;
+    const std::string count = folder / "count";
+    folder.write(
+        "model/run.sh",
+        fmt::format("#!/bin/sh\necho . >> '{}'\n{} \"$@\" || exit 1\nif {}; then sed -n 1,21p simulated.csv > s "
+                    "&& mv s simulated.csv; fi\n",
+                    count, MIREVO_TEST_MODEL, fmt::format(fmt::runtime(own.condition), count)),
+        0755);
+    const std::string dream = "Likelihood = 'normal'\n Error_Deviation = 3.0\n Burn_In_Share = 0.0";
+    const ProgramResult run = runProgram({writeDream(folder, {.maxEvaluations = 40}, dream)});
+    ASSERT_EQ(run.exitCode, 0) << run.error;
+    EXPECT_THAT(folder.read("basin.log"), HasSubstr(own.told));
+    const ReadTable table = readDataTable(folder.read("basin_Chains.dat"));
+    const double first = realCell(table.rows[0][*table.column("Log_Likelihood")]).value();
+    EXPECT_EQ(std::isfinite(first), own.firstCounts) << own.told;
+  }
+}
+
+TEST(Dream, MoreRunsAndOtherLimitsGoOnWithTheSameChains) {
+  const ModelFolder folder;
+  const std::string count = folder / "count";
+  folder.useScript("echo . >> '" + count + "'");
+  const auto linesOfCount = [&] { return std::ranges::count(folder.read("count"), '\n'); };
+  const auto rowsOf = [&] { return readDataTable(folder.read("basin_Chains.dat")).rows; };
+  const std::string dream = "Likelihood = 'AR(1)'\n Error_Deviation = 0.5, 5.0";
+  ASSERT_EQ(runProgram({writeDream(folder, {.maxEvaluations = 200, .restart = 1}, dream)}).exitCode, 0);
+  const auto before = rowsOf();
+  const RunSettings raised{.maxEvaluations = 400, .restart = 1};
+  const ProgramResult more = runProgram({writeDream(folder, raised, dream + "\n R_Hat_Limit = 1.01")});
+  ASSERT_EQ(more.exitCode, 0) << more.error;
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("Sample_Size was raised from 200 to 400"));
+  const auto after = rowsOf();
+  ASSERT_GT(after.size(), before.size());
+  EXPECT_TRUE(std::equal(before.begin(), before.end(), after.begin()));
+  EXPECT_LE(linesOfCount(), 400);
+  // Limits that the chains had met long before leave what was computed in the posterior.
+  const ProgramResult looser =
+      runProgram({writeDream(folder, raised, dream + "\n R_Hat_Limit = 100.0\n Effective_Size = 1.0")});
+  ASSERT_EQ(looser.exitCode, 0) << looser.error;
+  EXPECT_EQ(rowsOf(), after);
+  EXPECT_EQ(runProgram({writeDream(folder, {.maxEvaluations = 200, .restart = 1}, dream)}).exitCode, 1);
+}
+
+TEST(Dream, ARunThatFailsTooOftenTellsWhatHelpsAndGoesOnWithALargerLimit) {
+  const ModelFolder folder;
+  const std::string dream = "Likelihood = 'normal'\n Error_Deviation = 3.0";
+  RunSettings settings{.maxEvaluations = 80, .restart = 1};
+  folder.useScript("echo . >> '" + folder / "count" + "'; test $(wc -l < '" + folder / "count" + "') -gt 9 || exit 3");
+  const ProgramResult run = runProgram({writeDream(folder, settings, dream)});
+  EXPECT_EQ(run.exitCode, 1);
+  EXPECT_THAT(run.error, HasSubstr("whose violation needs no model run and is no failure here"));
+  settings.maxEvaluations = 120;
+  const ProgramResult more = runProgram({writeDream(folder, settings, dream)});
+  EXPECT_EQ(more.exitCode, 0) << more.error;
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("9 model runs failed or had no likelihood"));
 }
 
 }  // namespace

@@ -21,8 +21,9 @@ constexpr double kJumpNoise = 1e-6;                 // standard deviation of zet
 constexpr std::array kAdaptations{0.5, 0.75, 1.0};  // of burn-in
 constexpr std::size_t kFirstCheck = 50;             // generations behind burn-in
 constexpr double kCheckGrowth = 1.3;
-constexpr std::size_t kMostValues = 2000;  // of a chain that a check looks at
-constexpr int kMostDraws = 100000;         // for one prior draw that is allowed
+constexpr double kLeastValues = 2000.0;  // of a chain, that a check looks at if there are so many
+constexpr double kValuesPerDraw = 4.0;   // all chains together, for each independent draw that is wanted
+constexpr int kMostDraws = 100000;       // for one prior draw that is allowed
 
 /// The place in [lower, upper) at which a way that leaves it on one side and comes in on the other ends.
 double folded(double value, double lower, double upper) {
@@ -57,6 +58,17 @@ std::vector<std::vector<double>> ChainHistory::columns(std::size_t dimension, st
     }
   }
   return values;
+}
+
+std::vector<ChainHistory::State> ChainHistory::spread(std::size_t first, std::size_t most) const {
+  const std::size_t taken = std::max<std::size_t>(most / std::max<std::size_t>(chainCount_, 1), 1);
+  const std::size_t count = generations() - std::min(first, generations());
+  const std::size_t stride = std::max<std::size_t>((count + taken - 1) / taken, 1);
+  std::vector<State> states;
+  for (std::size_t g = first; g < generations(); g += stride) {
+    for (std::size_t c = 0; c < chainCount_; ++c) states.push_back(at(g, c));
+  }
+  return states;
 }
 
 double ConvergenceCheck::largestRHat() const {
@@ -356,9 +368,11 @@ void DreamSampler::endGeneration() {
     for (const std::vector<double>& point : currentPoints_) addToArchive(point);
     if (!burnIn_) adaptCrossover();
   }
-  const double burnInRuns = settings_.burnInShare * settings_.mostRuns;
-  if (adaptations_ < kAdaptations.size() && runs_ >= kAdaptations[adaptations_] * burnInRuns) {
-    ++adaptations_;
+  const double burnInRuns = settings_.burnInRuns();
+  const std::size_t before = adaptations_;
+  // In a short burn-in a generation may be the last before several of them.
+  while (adaptations_ < kAdaptations.size() && runs_ >= kAdaptations[adaptations_] * burnInRuns) ++adaptations_;
+  if (adaptations_ > before) {
     resetOutliers();
     forgetOldestArchive();
   }
@@ -372,7 +386,7 @@ void DreamSampler::endGeneration() {
       checks_.push_back(std::move(*check));
       const bool isEnough = checks_.back().largestRHat() <= settings_.rHatLimit &&
                             checks_.back().leastEffectiveSize() >= settings_.effectiveSize;
-      if (isEnough) end_ = DreamEnd::converged;
+      if (isEnough && runs_ >= settings_.leastRuns) end_ = DreamEnd::converged;
     }
   }
   // Of proposals that need no model run there could be any number.
@@ -387,7 +401,11 @@ void DreamSampler::endGeneration() {
 std::optional<ConvergenceCheck> DreamSampler::checkNow() const {
   if (!burnIn_ || history_.generations() < *burnIn_ + 4) return std::nullopt;
   ConvergenceCheck check{history_.generations(), runs_, {}, {}};
-  const std::size_t stride = (history_.generations() - *burnIn_ + kMostValues - 1) / kMostValues;
+  // More values cost time, but thinned ones must suffice for the effective size that is wanted, if the budget does.
+  const double wanted = settings_.effectiveSize <= settings_.mostRuns ? settings_.effectiveSize : 0.0;
+  const auto values = static_cast<std::size_t>(
+      std::max(kLeastValues, kValuesPerDraw * wanted / static_cast<double>(history_.chainCount())));
+  const std::size_t stride = (history_.generations() - *burnIn_ + values - 1) / values;
   for (std::size_t j = 0; j < dimension(); ++j) {
     const auto columns = history_.columns(j, *burnIn_, stride);
     check.rHat.push_back(splitRHat(columns));

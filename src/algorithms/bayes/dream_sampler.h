@@ -20,7 +20,9 @@ inline constexpr CodeName kBoundaryNames[] = {{std::nullopt, "fold"}, {std::null
 struct DreamSettings {
   std::int32_t chainCount = 4;        ///< N
   std::int32_t mostRuns = 0;          ///< model runs, all chains together
-  double burnInShare = 0.2;           ///< of mostRuns
+  double burnInShare = 0.2;           ///< of mostRuns, or of burnInOf
+  std::int32_t burnInOf = 0;          ///< mostRuns of an earlier run that this one goes on with; 0: none
+  std::int32_t leastRuns = 0;         ///< model runs that an earlier run has made, which are used in any case
   std::int32_t pairCount = 3;         ///< most pairs of archive members in a proposal (delta)
   std::int32_t crossoverCount = 3;    ///< crossover values 1/n, 2/n ... 1 (n_CR)
   double snookerShare = 0.1;          ///< share of snooker updates
@@ -29,6 +31,8 @@ struct DreamSettings {
   BoundaryHandling boundary = BoundaryHandling::fold;
   double rHatLimit = 1.05;       ///< the run may end when split R-hat of every dimension is at most this ...
   double effectiveSize = 400.0;  ///< ... and its effective sample size at least this
+
+  double burnInRuns() const { return burnInShare * (burnInOf > 0 ? burnInOf : mostRuns); }
 };
 
 /// What a proposal yields.
@@ -77,6 +81,8 @@ class ChainHistory final {
   State at(std::size_t generation, std::size_t chain) const;
   /// The values of one dimension in every `stride`-th generation from `first` on, one vector per chain.
   std::vector<std::vector<double>> columns(std::size_t dimension, std::size_t first, std::size_t stride = 1) const;
+  /// About `most` states or fewer, at equal distances from generation `first` on: all chains of each generation taken.
+  std::vector<State> spread(std::size_t first, std::size_t most) const;
 
  private:
   std::size_t chainCount_;

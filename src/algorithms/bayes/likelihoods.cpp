@@ -79,6 +79,12 @@ bool hasTerm(LikelihoodForm form, ErrorTerm term) {
   return false;
 }
 
+bool readsTerm(LikelihoodForm form, ErrorTerm term) {
+  if (term == kFreedom) return form == LikelihoodForm::student;
+  if (term == kSkewness || term == kKurtosis) return form == LikelihoodForm::generalised;
+  return form != LikelihoodForm::objective;
+}
+
 ErrorValues neutralErrors() {
   ErrorValues values{};
   for (std::size_t k = 0; k < values.size(); ++k) values[k] = errorTermRows()[k].neutral;
@@ -157,6 +163,14 @@ void SeriesErrors::countWhere(std::span<const double> simulated) {
   for (std::size_t t = 0; t < observed_.size(); ++t) {
     if (!std::isnan(observed_[t]) && std::isfinite(simulated[t])) counted_.push_back(t);
   }
+}
+
+std::size_t SeriesErrors::countIn(std::span<const double> simulated) const {
+  std::size_t count = 0;
+  for (std::size_t t = 0; t < observed_.size(); ++t) {
+    if (!std::isnan(observed_[t]) && std::isfinite(simulated[t])) ++count;
+  }
+  return count;
 }
 
 SeriesErrors::Step SeriesErrors::stepOver(double days, double correlation) const {

@@ -57,6 +57,9 @@ const std::array<ErrorTermRow, kErrorTermCount>& errorTermRows();
 /// Whether a form of the likelihood has the term without being asked for it.
 bool hasTerm(LikelihoodForm form, ErrorTerm term);
 
+/// Whether a form of the likelihood depends on the term, if the setup asks for it.
+bool readsTerm(LikelihoodForm form, ErrorTerm term);
+
 using ErrorValues = std::array<double, kErrorTermCount>;
 ErrorValues neutralErrors();
 
@@ -97,6 +100,8 @@ class SeriesErrors final {
   /// The observations at which `simulated`, one value per time, has one count; the others do not, whatever a run has.
   void countWhere(std::span<const double> simulated);
   std::size_t count() const { return counted_.size(); }
+  /// How many observations `simulated` has values for.
+  std::size_t countIn(std::span<const double> simulated) const;
 
   /// The natural logarithm of the density of the observations; -infinity where a simulated value is missing or has no
   /// transformed value.

@@ -279,7 +279,7 @@ std::vector<std::string> formatPosterior(const DreamSettings& settings, const Dr
                                              countText(static_cast<std::size_t>(sampler.runs()), "model run"))};
   lines.push_back(endText(settings, sampler.end()));
   if (failures > 0) {
-    lines.push_back(fmt::format("{} failed or without a likelihood: their sets have likelihood 0 and were rejected",
+    lines.push_back(fmt::format("{} failed or had no likelihood: their sets have likelihood 0 and were rejected",
                                 countText(static_cast<std::size_t>(failures), "model run")));
   }
   if (summary == nullptr) {
@@ -288,9 +288,10 @@ std::vector<std::string> formatPosterior(const DreamSettings& settings, const Dr
     return lines;
   }
   lines.push_back(
-      fmt::format("Burn-in: the first {} generations ({:g} of Sample_Size), which are left out; the "
+      fmt::format("Burn-in: the first {} generations, {:g} of {} model runs, which are left out; the "
                   "posterior is {} states behind it",
-                  *sampler.burnIn(), settings.burnInShare, summary->draws));
+                  *sampler.burnIn(), settings.burnInShare,
+                  settings.burnInOf > 0 ? settings.burnInOf : settings.mostRuns, summary->draws));
   const std::vector<DimensionFigures> figures = figuresOf(dimensions, *summary);
   appendConvergence(settings, figures, lines);
   appendCounts(sampler, lines);

@@ -4,6 +4,7 @@
 #include <cmath>
 #include <functional>
 #include <limits>
+#include <string_view>
 #include <utility>
 
 #include <fmt/format.h>
@@ -17,6 +18,7 @@ constexpr double kTradeOff = 0.7;  // correlation from which two parameters are 
 constexpr double kLittle = 0.9;    // of the prior's range, from which the data are said to say little
 constexpr double kFewAccepted = 0.05;
 constexpr std::size_t kMostNamed = 20;
+constexpr std::string_view kGoOn = "A larger Sample_Size and Restart = 1 go on from here";
 
 bool isApart(const DimensionFigures& one, const ConvergenceLimits& limits) {
   return !(one.rHat <= limits.rHat);
@@ -93,18 +95,22 @@ ConvergenceWords convergenceWords(std::span<const DimensionFigures> dimensions, 
   if (apart.empty() && few.empty()) {
     words.findings.emplace_back("The chains have converged, as far as R-hat and the effective sample sizes tell");
   }
+  const std::string fewText =
+      few.empty() ? ""
+                  : fmt::format("the effective sample size is below {:g} for {}", limits.effectiveSize, listed(few));
   if (!apart.empty()) {
+    words.findings.push_back(
+        fmt::format("The chains have not converged: R-hat is above {:g} for {}{}{}. The quantiles below are not those "
+                    "of the posterior "
+                    "yet. {}; where R-hat stays large, the posterior may have several peaks (more chains help: "
+                    "Chain_Count) or burn-in "
+                    "is too short (Burn_In_Share), which the states in _Chains.dat show; the run then begins anew",
+                    limits.rHat, listed(apart), few.empty() ? "" : ", and ", fewText, kGoOn));
+  } else if (!few.empty()) {
     words.findings.push_back(fmt::format(
-        "The chains have not converged: R-hat is above {:g} for {}. The quantiles below are not those of the "
-        "posterior yet. Raise Sample_Size; where R-hat stays large, the posterior may have several peaks (more chains "
-        "help: Chain_Count) or burn-in is too short (Burn_In_Share), which the states in _Chains.dat show",
-        limits.rHat, listed(apart)));
-  }
-  if (!few.empty()) {
-    words.findings.push_back(fmt::format(
-        "The {}, but the effective sample size is below {:g} for {}: means are known to about a "
-        "standard deviation divided by its square root, the 5 and 95 % quantiles less well. Raise Sample_Size",
-        apart.empty() ? "chains agree" : "chains agree in the others", limits.effectiveSize, listed(few)));
+        "The chains have not converged: R-hat is at most {:g} for all parameters, but {}. Means are known to about a "
+        "standard deviation divided by its square root, the 5 and 95 % quantiles less well. {}",
+        limits.rHat, fewText, kGoOn));
   }
   words.state = !apart.empty() ? Convergence::apart : !few.empty() ? Convergence::fewDraws : Convergence::reached;
   return words;

@@ -17,7 +17,6 @@
 namespace mirevo {
 namespace {
 
-constexpr std::string_view kBudgetUsedUp = "Optimisation terminated: Maximum number of model evaluations reached";
 
 /// Lines of which the log shows that many.
 constexpr std::size_t kMostNotes = 500;
@@ -131,7 +130,7 @@ SearchStatus Glm::initialise() {
   if (starts_.empty()) {
     end("Optimisation terminated: No model run of the initial sample succeeded");
   } else if (budgetLeft() <= 0) {
-    end(std::string(kBudgetUsedUp));
+    end(std::string(kBudgetUsedMessage));
   } else {
     startNext();
   }
@@ -308,7 +307,7 @@ SearchStatus Glm::advance() {
   ++iteration_;
   madeBefore_ = summary_.evaluationCount;
   if (needsJacobian_ && !makeJacobian()) {
-    end(std::string(kBudgetUsedUp));
+    end(std::string(kBudgetUsedMessage));
     return kSearchOk;
   }
   GlmLinearModel model = linearModel();
@@ -340,7 +339,7 @@ SearchStatus Glm::advance() {
       accept(*std::move(points[*best]), used[*best], expected);
     }
     if (isCut || budgetLeft() <= 0) {
-      if (!isTerminated()) end(std::string(kBudgetUsedUp));
+      if (!isTerminated()) end(std::string(kBudgetUsedMessage));
       return kSearchOk;
     }
     if (best) return kSearchOk;

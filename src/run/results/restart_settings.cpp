@@ -11,6 +11,7 @@
 
 #include <fmt/core.h>
 
+#include "algorithms/analyses/uncertainty.h"
 #include "common/checksum.h"
 #include "common/files.h"
 #include "common/text.h"
@@ -101,6 +102,15 @@ SettingIndex indexOf(const RestartSettings& settings) {
   return index;
 }
 
+/// Whether the setting is the budget of a search or of Markov chains, which a restart may raise.
+bool isBudget(const RestartSettings& settings, const ResultSetting& setting) {
+  if (setting.keyword == kBudgetKeyword) return true;
+  if (setting.section != kUncertaintySection || setting.keyword != kSampleSizeKeyword) return false;
+  return std::ranges::any_of(settings.settings, [&](const ResultSetting& other) {
+    return other.section == setting.section && other.keyword == kUncertaintyTypeKeyword && other.value == "'DREAM'";
+  });
+}
+
 /// A section for messages: "PARAMETER_3 (X3)" if the item has a name, else its whole path.
 std::string shownSection(const SettingIndex& index, std::string_view section) {
   std::size_t start = 0;
@@ -172,7 +182,7 @@ bool isLaterVersion(std::string_view version) {
 
 std::optional<int> searchBudget(const RestartSettings& settings) {
   for (const ResultSetting& setting : settings.settings) {
-    if (setting.keyword == kBudgetKeyword) return parseInteger(setting.value);
+    if (isBudget(settings, setting)) return parseInteger(setting.value);
   }
   return std::nullopt;
 }
@@ -192,7 +202,7 @@ std::vector<std::string> changedSettings(const RestartSettings& then, const Rest
     if (found == before.end()) {
       // An earlier version that did not know the keyword worked like its default.
       if (!setting.isDefault) note(setting, after, fmt::format("absent then, {} now", setting.value));
-    } else if (found->second->value != setting.value && !(isRaised && setting.keyword == kBudgetKeyword)) {
+    } else if (found->second->value != setting.value && !(isRaised && isBudget(now, setting))) {
       note(setting, after, fmt::format("{} then, {} now", found->second->value, setting.value));
     }
   }

@@ -43,7 +43,7 @@ bool isLaterVersion(std::string_view version);
 /// (`Max_No_Evaluations`) is not a change.
 std::vector<std::string> changedSettings(const RestartSettings& then, const RestartSettings& now);
 
-/// The budget of a search; empty for another task.
+/// The budget of a search or of Markov chains; empty for another task.
 std::optional<int> searchBudget(const RestartSettings& settings);
 
 }  // namespace mirevo

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <string>
 #include <utility>
+#include <vector>
 
 #include <fmt/format.h>
 
@@ -25,10 +26,13 @@ Enum named(const CodeName (&names)[Count], const SetupValue& value) {
   return static_cast<Enum>(found);
 }
 
+constexpr std::string_view kErrorModelRefusal = "Error: Error model of DREAM invalid";
+
 constexpr char kDeviationMeaning[] =
     "Standard deviation of the errors; in the unit of the transformed series with `Box_Cox_Lambda`; with "
     "`Error_Share` its part that is the same for all values; with `Likelihood = 'Student'` the scale. By default "
-    "between 0.001 and 10 times the standard deviation of the observations. The prior is uniform for its logarithm.";
+    "between 0.001 and 10 times the standard deviation of the observations. The prior is uniform for its logarithm, "
+    "with a lower bound of 0 for the deviation itself.";
 
 constexpr const char* kTermMeanings[] = {
     kDeviationMeaning,
@@ -78,17 +82,20 @@ std::vector<KeywordRow> dreamRows() {
       setting<&DreamSection::objective>({.name = kObjectiveKeyword,
                                          .defaultValue = "0",
                                          .range = from(0),
+                                         .refusal = kDreamRefusal,
                                          .meaning = "With `Likelihood = 'objective'`, the number of the objective "
                                                     "function; 0: the aggregate of all."}),
       setting<DreamSection>([](auto& s) -> auto& { return s.sampler.chainCount; },
                             {.name = "Chain_Count",
                              .defaultValue = "4",
                              .range = between(3, 1000),
+                             .refusal = kDreamRefusal,
                              .meaning = "Markov chains. Each generation runs the model once for each, all at a time."}),
       setting<DreamSection>([](auto& s) -> auto& { return s.sampler.burnInShare; },
                             {.name = "Burn_In_Share",
                              .defaultValue = "0.2",
                              .range = between(0.0, 0.9),
+                             .refusal = kDreamRefusal,
                              .unit = "of `Sample_Size`",
                              .meaning = "Model runs at the beginning that are no part of the posterior. Crossover "
                                         "probabilities and outlier chains are dealt with in them alone."}),
@@ -96,39 +103,50 @@ std::vector<KeywordRow> dreamRows() {
                             {.name = "R_Hat_Limit",
                              .defaultValue = "1.05",
                              .range = from(1.0),
+                             .refusal = kDreamRefusal,
                              .meaning = "The run ends before its budget once R-hat of all parameters is at most this "
-                                        "..."}),
-      setting<DreamSection>([](auto& s) -> auto& { return s.sampler.effectiveSize; },
-                            {.name = "Effective_Size",
-                             .defaultValue = "400",
-                             .range = kPositive,
-                             .meaning = "... and the effective sample size of each at least this."}),
+                                        "...",
+                             .bearsOnResults = kNotOfResults}),
+      setting<DreamSection>(
+          [](auto& s) -> auto& { return s.sampler.effectiveSize; },
+          {.name = kEffectiveSizeKeyword,
+           .defaultValue = "400",
+           .range = kPositive,
+           .refusal = kDreamRefusal,
+           .meaning = "... and the effective sample size of each at least this. It can be no more than "
+                      "the model runs behind burn-in.",
+           .bearsOnResults = kNotOfResults}),
       setting<DreamSection>([](auto& s) -> auto& { return s.sampler.pairCount; },
                             {.name = "Max_Pairs",
                              .defaultValue = "3",
                              .range = between(1, 10),
+                             .refusal = kDreamRefusal,
                              .meaning = "Most pairs of archive members whose differences make a jump."}),
       setting<DreamSection>([](auto& s) -> auto& { return s.sampler.crossoverCount; },
                             {.name = "Crossover_Values",
                              .defaultValue = "3",
                              .range = between(1, 100),
+                             .refusal = kDreamRefusal,
                              .meaning = "Number n of crossover values 1/n, 2/n ... 1: the share of the parameters that "
                                         "a jump changes."}),
       setting<DreamSection>([](auto& s) -> auto& { return s.sampler.snookerShare; },
                             {.name = "Snooker_Share",
                              .defaultValue = "0.1",
                              .range = between(0.0, 0.9),
+                             .refusal = kDreamRefusal,
                              .meaning = "Share of snooker updates among the jumps."}),
       setting<DreamSection>([](auto& s) -> auto& { return s.sampler.archiveInterval; },
                             {.name = "Archive_Interval",
                              .defaultValue = "10",
                              .range = from(1),
+                             .refusal = kDreamRefusal,
                              .unit = "generations",
                              .meaning = "How often the states of the chains are added to the archive."}),
       setting<DreamSection>([](auto& s) -> auto& { return s.sampler.archiveStart; },
                             {.name = "Archive_Start",
                              .defaultValue = "0",
                              .range = between(0, 1'000'000),
+                             .refusal = kDreamRefusal,
                              .meaning = "Draws from the prior in the archive at the beginning, which need no model "
                                         "run; 0: ten for each parameter."}),
       choice<DreamSection>(
@@ -165,18 +183,16 @@ void checkTerms(const SetupSection& section, const ErrorModelSettings& settings)
     const std::vector<double>& numbers = settings.terms[k];
     const ErrorTermRow& row = errorTermRows()[k];
     const auto refuse = [&](const std::string& explanation) {
-      section.refuse("Error: Error model of DREAM invalid", row.keyword, explanation);
+      section.refuse(kErrorModelRefusal, row.keyword, explanation);
     };
     if (numbers.empty()) continue;
     if (numbers.size() > 2) {
       refuse(fmt::format("expected one number (a fixed value) or two (bounds), found {}", numbers.size()));
     }
+    const bool isFixedDeviation = k == kDeviation && numbers.size() == 1;
+    const ValueRange range{row.least, row.most, isFixedDeviation};
     for (const double number : numbers) {
-      const bool isPositive = k == kDeviation && numbers.size() == 1;
-      if (!(number >= row.least && number <= row.most) || (isPositive && number == 0.0)) {
-        refuse(fmt::format("expected {:g} to {:g}{}, found {:g}", row.least, row.most, isPositive ? ", but not 0" : "",
-                           number));
-      }
+      if (!range.contains(number)) refuse(fmt::format("expected {}, found {:g}", range.text(), number));
     }
     if (numbers.size() == 2 && !(numbers[0] < numbers[1])) {
       refuse(fmt::format("expected a lower bound below the upper one, found {:g} and {:g}", numbers[0], numbers[1]));
@@ -184,14 +200,76 @@ void checkTerms(const SetupSection& section, const ErrorModelSettings& settings)
   }
 }
 
+std::string_view nameOf(LikelihoodForm form) {
+  return kLikelihoodNames[static_cast<std::size_t>(form)].name;
+}
+
+bool hasTransformation(LikelihoodForm form, const ErrorModelSettings& common, const ErrorModelSettings& own) {
+  const std::vector<double>& lambda = own.terms[kLambda].empty() ? common.terms[kLambda] : own.terms[kLambda];
+  if (form == LikelihoodForm::objective) return false;
+  return lambda.empty() ? hasTerm(form, kLambda) : lambda != std::vector<double>{1.0};
+}
+
+/// Refuses what is written in `section` though none of the error models that have it depends on it: estimated, it would
+/// have its prior for a posterior. `models`: forms, each with the settings that go before `common`.
+using ErrorModels = std::vector<std::pair<LikelihoodForm, const ErrorModelSettings*>>;
+void refuseUnread(const SetupSection& section, const ErrorModelSettings& written, const ErrorModelSettings& common,
+                  const ErrorModels& models) {
+  const auto refuse = [&](std::string_view keyword, std::string_view expected) {
+    section.refuse(kErrorModelRefusal, keyword,
+                   fmt::format("{} = '{}' does not depend on it: expected {}, or no {}", kLikelihoodKeyword,
+                               nameOf(models.front().first), expected, keyword));
+  };
+  for (std::size_t k = 0; k < kErrorTermCount; ++k) {
+    const auto isRead = [k](const auto& model) { return readsTerm(model.first, static_cast<ErrorTerm>(k)); };
+    if (written.terms[k].empty() || std::ranges::any_of(models, isRead)) continue;
+    refuse(errorTermRows()[k].keyword, k == kFreedom                      ? "'Student'"
+                                       : k == kSkewness || k == kKurtosis ? "'generalised'"
+                                                                          : "the likelihood of a series");
+  }
+  const auto isTransformed = [&](const auto& model) { return hasTransformation(model.first, common, *model.second); };
+  if (written.shift && !std::ranges::any_of(models, isTransformed)) {
+    refuse("Box_Cox_Shift", "'Box-Cox', or a Box_Cox_Lambda other than 1");
+  }
+}
+
+/// What depends on other settings of the section, or on what the likelihood is of.
+void checkDream(const SetupSection& dream, const DreamSection& settings, std::size_t objectiveCount,
+                bool comparesSeries) {
+  const DreamSettings& sampler = settings.sampler;
+  const double behindBurnIn = sampler.mostRuns - sampler.burnInRuns();
+  if (dream.isWritten(kEffectiveSizeKeyword) && sampler.effectiveSize > behindBurnIn) {
+    dream.refuse(kDreamRefusal, kEffectiveSizeKeyword,
+                 fmt::format("expected at most {:g}, the part of Sample_Size behind burn-in, found {:g}", behindBurnIn,
+                             sampler.effectiveSize));
+  }
+  if (settings.errors.form == LikelihoodForm::objective) {
+    if (static_cast<std::size_t>(settings.objective) > objectiveCount) {
+      dream.refuse(kDreamLikelihoodRefusal, kObjectiveKeyword,
+                   fmt::format("expected 0 to {}, found {}", objectiveCount, settings.objective));
+    }
+    return;
+  }
+  if (!comparesSeries) {
+    dream.refuse(kDreamLikelihoodRefusal, kLikelihoodKeyword,
+                 "no objective function compares time series: expected 'objective'");
+  }
+  if (dream.isWritten(kObjectiveKeyword)) {
+    dream.refuse(kErrorModelRefusal, kObjectiveKeyword,
+                 fmt::format("{} = '{}' does not depend on it: expected 'objective', or no {}", kLikelihoodKeyword,
+                             nameOf(*settings.errors.form), kObjectiveKeyword));
+  }
+}
+
 }  // namespace
 
 const SettingSection<DreamSection>& dreamSection() {
-  static const SettingSection<DreamSection> section{{"UNCERTAINTY_ESTIMATION/DREAM",
-                                                     "when `Uncertainty_Type` is 'DREAM'",
-                                                     "The posterior distribution by Markov chains, DREAM(ZS). "
-                                                     "`Sample_Size` is the most model runs that it makes.",
-                                                     dreamRows()}};
+  static const SettingSection<DreamSection> section{
+      {"UNCERTAINTY_ESTIMATION/DREAM", "when `Uncertainty_Type` is 'DREAM'",
+       "The posterior distribution by Markov chains, DREAM(ZS). "
+       "`Sample_Size` is the most model runs that it makes, and at least ten for "
+       "each chain.",
+       dreamRows()}};
   return section;
 }
 
@@ -223,30 +301,29 @@ void readDreamSection(const SetupSection& section, std::span<const OutputMeasure
   constexpr std::size_t kMostMeasures = 10'000;
   const SetupSection dream = section.open("DREAM");
   dream.read(dreamSection(), settings);
+  settings.place = dream.location(kLikelihoodKeyword);
   checkTerms(dream, settings.errors);
   const std::vector<std::size_t> compared = measuresOfLikelihood(measures, objectives);
-  if (settings.errors.form == LikelihoodForm::objective) {
-    if (static_cast<std::size_t>(settings.objective) > objectives.size()) {
-      dream.refuse(kDreamLikelihoodRefusal, kObjectiveKeyword,
-                   fmt::format("expected 0 to {}, found {}", objectives.size(), settings.objective));
-    }
-  } else if (compared.empty()) {
-    dream.refuse(kDreamLikelihoodRefusal, kLikelihoodKeyword,
-                 "no objective function compares time series: expected 'objective'");
-  }
+  checkDream(dream, settings, objectives.size(), !compared.empty());
+  const LikelihoodForm form = *settings.errors.form;
+  ErrorModels models{{form, &settings.errors}};
   for (std::size_t n = 1; n <= kMostMeasures; ++n) {
     if (!dream.has(fmt::format("{}{}", kErrorModelPrefix, n))) continue;
     const SetupSection own = dream.openItem(kErrorModelPrefix, n);
-    own.read(errorModelSection(), settings.own[n]);
-    checkTerms(own, settings.own[n]);
-    if (settings.own[n].form == LikelihoodForm::objective || settings.errors.form == LikelihoodForm::objective) {
-      own.refuse("Error: Error model of DREAM invalid", kLikelihoodKeyword,
+    ErrorModelSettings& model = settings.own[n];
+    own.read(errorModelSection(), model);
+    checkTerms(own, model);
+    if (model.form == LikelihoodForm::objective || form == LikelihoodForm::objective) {
+      own.refuse(kErrorModelRefusal, kLikelihoodKeyword,
                  "expected no error model of an output measure where the likelihood is an objective function");
     }
     if (std::ranges::find(compared, n - 1) == compared.end()) {
       dream.refuse(kDreamLikelihoodRefusal, fmt::format("{}{}", kErrorModelPrefix, n), std::string(kErrorModelMeasure));
     }
+    models.emplace_back(model.form.value_or(form), &model);
+    refuseUnread(own, model, settings.errors, {models.back()});
   }
+  refuseUnread(dream, settings.errors, settings.errors, models);
 }
 
 }  // namespace mirevo

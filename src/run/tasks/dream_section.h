@@ -5,6 +5,7 @@
 #include <map>
 #include <optional>
 #include <span>
+#include <string>
 #include <string_view>
 #include <vector>
 
@@ -32,9 +33,12 @@ struct DreamSection {
   std::map<std::size_t, ErrorModelSettings>
       own;                     ///< of an output measure, by its number from 1; what it leaves open is as above
   std::int32_t objective = 0;  ///< of Likelihood = 'objective': its number; 0: the aggregate
+  std::string place;           ///< of the likelihood, "setup.kdx:14:9"
 };
 
 inline constexpr std::string_view kLikelihoodKeyword = "Likelihood";
+inline constexpr std::string_view kEffectiveSizeKeyword = "Effective_Size";
+inline constexpr std::string_view kDreamRefusal = "Error: Setting of DREAM invalid";
 inline constexpr std::string_view kDreamLikelihoodRefusal = "Error: Likelihood of DREAM invalid";
 inline constexpr std::string_view kErrorModelPrefix = "ERROR_MODEL_";
 inline constexpr std::string_view kErrorModelMeasure =
@@ -49,8 +53,8 @@ const SettingSection<ErrorModelSettings>& errorModelSection();
 std::vector<std::size_t> measuresOfLikelihood(std::span<const OutputMeasure> measures,
                                               std::span<const ObjectiveFunction> objectives);
 
-/// Reads the section DREAM of `section` and those inside it. Throws FatalError, also where the likelihood does not fit
-/// the output measures and objective functions.
+/// Reads the section DREAM of `section` and those inside it, with `settings.sampler.mostRuns` given. Throws FatalError,
+/// also where the likelihood does not fit the output measures and objective functions.
 void readDreamSection(const SetupSection& section, std::span<const OutputMeasure> measures,
                       std::span<const ObjectiveFunction> objectives, DreamSection& settings);
 

@@ -20,9 +20,10 @@ constexpr double kInfinity = std::numeric_limits<double>::infinity();
 /// The value of a term with one number, or its bounds; the default where the setup says nothing.
 std::vector<double> numbersOf(ErrorTerm term, const ErrorModelSettings& common, const ErrorModelSettings* own,
                               LikelihoodForm form) {
+  const ErrorTermRow& row = errorTermRows()[term];
+  if (!readsTerm(form, term)) return {row.neutral};
   if (own != nullptr && !own->terms[term].empty()) return own->terms[term];
   if (!common.terms[term].empty()) return common.terms[term];
-  const ErrorTermRow& row = errorTermRows()[term];
   if (!hasTerm(form, term)) return {row.neutral};
   return {row.lower, row.upper};
 }
@@ -54,9 +55,10 @@ void DreamTarget::addSeries(const DreamSection& settings, const TaskContext& con
     const ErrorModelSettings* const own = found == settings.own.end() ? nullptr : &found->second;
     const LikelihoodForm form = own != nullptr && own->form ? *own->form : *settings.errors.form;
     const double shift = own != nullptr && own->shift ? *own->shift : settings.errors.shift.value_or(0.0);
-    series_.push_back(
-        {k, begin, SeriesErrors(form, shift, observed.days, observed.values, observed.weights), neutralErrors(), {}});
-    addTerms(settings.errors, own, form, measure.name, series_.back());
+    SeriesErrors errors(form, shift, observed.days, observed.values, observed.weights);
+    const std::size_t count = errors.count();
+    series_.push_back({measure.name, k, begin, std::move(errors), count, neutralErrors(), {}});
+    addTerms(settings, own, form, series_.back());
   }
   // Two measures that compare the same, by the number and by the name of an item, are told apart until here.
   for (const auto& [number, own] : settings.own) {
@@ -65,15 +67,17 @@ void DreamTarget::addSeries(const DreamSection& settings, const TaskContext& con
   }
 }
 
-void DreamTarget::addTerms(const ErrorModelSettings& common, const ErrorModelSettings* own, LikelihoodForm form,
-                           const std::string& measure, Series& series) {
+void DreamTarget::addTerms(const DreamSection& settings, const ErrorModelSettings* own, LikelihoodForm form,
+                           Series& series) {
+  const ErrorModelSettings& common = settings.errors;
+  const std::string& measure = series.name;
   const std::vector<double> lambda = numbersOf(kLambda, common, own, form);
   if (lambda != std::vector<double>{1.0}) {
     if (const auto value = series.errors.untransformable()) {
       fatalError(kDreamLikelihoodRefusal,
-                 fmt::format("the observation {:g} of {} has no Box-Cox transformation: expected a Box_Cox_Shift with "
-                             "which all observations are above 0",
-                             *value, quotedForMessage(measure)));
+                 fmt::format("{}: the observation {:g} of {} has no Box-Cox transformation: expected a Box_Cox_Shift "
+                             "with which all observations are above 0",
+                             settings.place, *value, quotedForMessage(measure)));
     }
   }
   for (std::size_t k = 0; k < kErrorTermCount; ++k) {
@@ -86,8 +90,8 @@ void DreamTarget::addTerms(const ErrorModelSettings& common, const ErrorModelSet
       numbers = {1e-3 * std::min(one, other), 10.0 * std::max(one, other)};
       if (!(numbers.front() > 0.0)) {
         fatalError(kDreamLikelihoodRefusal,
-                   fmt::format("the observations of {} do not vary: expected {} with a value or with bounds",
-                               quotedForMessage(measure), row.keyword));
+                   fmt::format("{}: the observations of {} do not vary: expected {} with a value or with bounds",
+                               settings.place, quotedForMessage(measure), row.keyword));
       }
     }
     if (numbers.size() == 1) {
@@ -136,16 +140,38 @@ double DreamTarget::objectiveOf(const TaskContext& context, const EvaluationResu
   return context.aggregate ? context.aggregate(values) : result.aggregate;
 }
 
-/// Of a run that succeeded.
-double DreamTarget::logLikelihood(const TaskContext& context, int number, std::span<const double> point) {
-  double sum = 0.0;
+/// The observations of each series that the most complete of these runs, if one succeeded, has values for. Which they
+/// are must not change behind that: likelihoods of other observations cannot be compared.
+void DreamTarget::countObservations(const TaskContext& context, std::span<const EvaluationResult> results) {
   for (Series& series : series_) {
-    const std::size_t count = context.observedSeries[series.observed].values.size();
-    const std::vector<double> simulated = context.simulatedColumns(std::span(&number, 1), series.first, count);
-    if (!hasCounted_) series.errors.countWhere(simulated);
-    sum += series.errors.logLikelihood(simulated, errorsOf(series, point));
+    std::vector<double> most;
+    for (const EvaluationResult& result : results) {
+      if (!result.ok()) continue;
+      const std::size_t count = context.observedSeries[series.observed].values.size();
+      std::vector<double> simulated = context.simulatedColumns(std::span(&result.number, 1), series.first, count);
+      if (most.empty() || series.errors.countIn(simulated) > series.errors.countIn(most)) most = std::move(simulated);
+    }
+    if (most.empty()) return;
+    series.errors.countWhere(most);
   }
   hasCounted_ = true;
+  for (const CountLine& line : countLines()) {
+    if (line.isWarning) {
+      context.log.warning(line.text);
+    } else {
+      context.log.line(line.text);
+    }
+  }
+}
+
+/// Of a run that succeeded.
+double DreamTarget::logLikelihood(const TaskContext& context, int number, std::span<const double> point) const {
+  double sum = 0.0;
+  for (const Series& series : series_) {
+    const std::size_t count = context.observedSeries[series.observed].values.size();
+    const std::vector<double> simulated = context.simulatedColumns(std::span(&number, 1), series.first, count);
+    sum += series.errors.logLikelihood(simulated, errorsOf(series, point));
+  }
   return std::isnan(sum) ? -kInfinity : sum;
 }
 
@@ -157,6 +183,7 @@ std::vector<ProposalResult> DreamTarget::evaluate(const TaskContext& context,
   }
   std::vector<EvaluationResult> results;
   if (!sets.empty()) results = context.evaluator.evaluateParameterSets(sets, DispatchMode::task);
+  if (!hasCounted_) countObservations(context, results);
   std::vector<ProposalResult> found;
   std::size_t next = 0;
   for (const DreamProposal& proposal : proposals) {
@@ -203,27 +230,45 @@ ShownDimensions DreamTarget::shown(const SearchSpace& space) const {
   return dimensions;
 }
 
-std::vector<std::vector<double>> DreamTarget::priorDraws(std::size_t count) const {
+std::vector<std::vector<double>> DreamTarget::priorDraws(const Feasibility& feasibility, std::size_t count) const {
+  constexpr int kMostTries = 1'000'000;
   ChainRandom random(1);
   std::vector<std::vector<double>> draws;
   std::vector<double> unit(lower_.size());
-  for (std::size_t i = 0; i < count; ++i) {
+  for (int i = 0; i < kMostTries && draws.size() < count; ++i) {
     for (double& value : unit) value = random.uniform();
-    draws.push_back(pointAt(unit));
+    std::vector<double> point = pointAt(unit);
+    bool isPossible = true;
+    for (std::size_t j = 0; j < point.size(); ++j) {
+      isPossible = isPossible && point[j] >= lower_[j] && point[j] <= upper_[j];
+    }
+    if (isPossible && logPrior(feasibility, point) > -kInfinity) draws.push_back(std::move(point));
   }
   return draws;
 }
 
+std::vector<DreamTarget::CountLine> DreamTarget::countLines() const {
+  std::vector<CountLine> lines;
+  for (const Series& series : series_) {
+    const std::size_t count = series.errors.count();
+    const bool lacksSome = count < series.observationCount;
+    lines.push_back(
+        {lacksSome ? fmt::format("The likelihood is of {} of the {} observations of {}: for the others the most "
+                                 "complete of the first runs has no simulated value. They do not count in any run",
+                                 count, series.observationCount, series.name)
+                   : fmt::format("The likelihood is of all {} observations of {}", count, series.name),
+         lacksSome});
+  }
+  return lines;
+}
+
 std::vector<std::string> DreamTarget::descriptionLines() const {
   std::vector<std::string> lines;
-  for (const Series& series : series_) {
-    lines.push_back(fmt::format("Likelihood of {} observations", series.errors.count()));
-  }
   for (const Dimension& dimension : errors_) {
     const double lower = dimension.isLogarithmic ? std::exp(dimension.lower) : dimension.lower;
     const double upper = dimension.isLogarithmic ? std::exp(dimension.upper) : dimension.upper;
     lines.push_back(fmt::format("   {}: estimated between {:.6g} and {:.6g}{}", dimension.name, lower, upper,
-                                dimension.isLogarithmic ? ", log-uniform prior" : ""));
+                                dimension.isLogarithmic ? ", log-uniform prior" : ", uniform prior"));
   }
   return lines;
 }

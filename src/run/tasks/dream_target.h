@@ -21,9 +21,11 @@ class DreamTarget final {
  public:
   /// A series whose errors the likelihood is of.
   struct Series {
+    std::string name;          ///< of its output measure
     std::size_t observed = 0;  ///< index in TaskContext::observedSeries
     std::size_t first = 0;     ///< of its values among the simulated ones of a run
     SeriesErrors errors;
+    std::size_t observationCount = 0;
     ErrorValues fixed;
     std::array<std::optional<std::size_t>, kErrorTermCount> dimensions;  ///< of the terms that are estimated
   };
@@ -35,12 +37,20 @@ class DreamTarget final {
   DreamProblem problem(const TaskContext& context);
 
   ShownDimensions shown(const SearchSpace& space) const;
-  std::vector<std::vector<double>> priorDraws(std::size_t count) const;
+  /// Draws from the prior that can be run; fewer than `count` where hardly any can.
+  std::vector<std::vector<double>> priorDraws(const Feasibility& feasibility, std::size_t count) const;
   const std::vector<Series>& series() const { return series_; }
   ErrorValues errorsOf(const Series& series, std::span<const double> point) const;
   /// Model runs without a likelihood.
   int failures() const { return failures_; }
   std::vector<std::string> descriptionLines() const;
+  /// Which observations of a series the likelihood is of, once runs have told.
+  struct CountLine {
+    std::string text;
+    bool isWarning = false;
+  };
+  std::vector<CountLine> countLines() const;
+  bool hasCounted() const { return hasCounted_; }
 
  private:
   struct Dimension {
@@ -51,12 +61,12 @@ class DreamTarget final {
   };
 
   void addSeries(const DreamSection& settings, const TaskContext& context);
-  void addTerms(const ErrorModelSettings& common, const ErrorModelSettings* own, LikelihoodForm form,
-                const std::string& measure, Series& series);
+  void addTerms(const DreamSection& settings, const ErrorModelSettings* own, LikelihoodForm form, Series& series);
   std::vector<double> pointAt(std::span<const double> unit) const;
   double logPrior(const Feasibility& feasibility, std::span<const double> point) const;
   std::vector<ProposalResult> evaluate(const TaskContext& context, std::span<const DreamProposal> proposals);
-  double logLikelihood(const TaskContext& context, int number, std::span<const double> point);
+  void countObservations(const TaskContext& context, std::span<const EvaluationResult> results);
+  double logLikelihood(const TaskContext& context, int number, std::span<const double> point) const;
   double objectiveOf(const TaskContext& context, const EvaluationResult& result) const;
 
   ParameterDistributions prior_;
@@ -65,7 +75,7 @@ class DreamTarget final {
   std::vector<Dimension> errors_;
   std::vector<Series> series_;
   std::optional<std::size_t> objective_;  ///< its number from 1, 0: the aggregate
-  bool hasCounted_ = false;               ///< whether a successful run has told which observations count
+  bool hasCounted_ = false;               ///< whether successful runs have told which observations count
   /// The log-likelihood of each run if it is an objective function, and -infinity of each that failed.
   std::unordered_map<int, double> known_;
   int failures_ = 0;

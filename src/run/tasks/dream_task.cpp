@@ -1,8 +1,14 @@
 #include "run/tasks/dream_task.h"
 
+#include <algorithm>
+
 #include <fmt/format.h>
 
+#include "algorithms/analyses/sampled_distributions.h"
 #include "algorithms/bayes/posterior.h"
+#include "common/fatal_error.h"
+#include "common/text.h"
+#include "evaluation/failed_run_policy.h"
 #include "run/tasks/analysis_names.h"
 #include "run/tasks/distribution_reading.h"
 #include "run/tasks/posterior_bands.h"
@@ -12,7 +18,10 @@
 namespace mirevo {
 namespace {
 
-constexpr std::size_t kPriorDraws = 10'000;
+constexpr std::size_t kPriorDraws = 40'000;
+constexpr std::size_t kLeastPriorDraws = 1'000;
+constexpr std::size_t kMostPriorValues = 4'000'000;  // 32 MB
+constexpr const char* kPriorRefusal = "Error: Prior of DREAM invalid";
 constexpr CodeName kFormName{std::nullopt, "DREAM"};
 
 }  // namespace
@@ -40,22 +49,57 @@ void DreamTask::read(const TaskReading& reading) {
   section.require(validateBandEnd(settings, reading.period));
   prior_ = readDistributions(reading, section);
   if (const auto discrete = prior_.firstWithoutDensity()) {
-    section.refuse("Error: Prior of DREAM invalid", "Uncertainty_Type",
+    section.refuse(kPriorRefusal, kUncertaintyTypeKeyword,
                    fmt::format("the distribution of variable parameter {} has single values: expected one with a "
                                "density, as chains move in small steps",
                                *discrete + 1));
   }
-  readDreamSection(section, reading.measures, reading.objectives, dream);
+  refuseImpossiblePriors(reading, section);
   dream.sampler.mostRuns = settings.sampleSize;
+  readDreamSection(section, reading.measures, reading.objectives, dream);
+  checkSize(reading, section);
+}
+
+/// A parameter that has one value only, or whose prior has none between its bounds.
+void DreamTask::refuseImpossiblePriors(const TaskReading& reading, const SetupSection& section) const {
+  if (reading.variableCount == 0) return;
+  const SearchSpace space = BuildSearchSpace(reading.parameters);
+  std::size_t variable = 0;
+  for (std::size_t k = 0; k < reading.parameters.size(); ++k) {
+    if (reading.parameters[k].parameterType != ParameterType::variable) continue;
+    const std::size_t j = variable++;
+    const SetupSection& parameter = reading.parameterSections[k];
+    if (!(space.upper[j] > space.lower[j])) {
+      parameter.refuse("Error: Lower bound equal to upper bound for parameter " + space.names[j], "Upper_Bound",
+                       fmt::format("expected more than {} for a parameter with a density; Parameter_Type = 1 fixes a "
+                                   "parameter",
+                                   formatReal(reading.parameters[k].lowerBound)));
+    }
+    constexpr double kLeastShare = 1e-4;  // a draw is tried 100,000 times
+    const double share = prior_[j].cumulative(space.upper[j]) - prior_[j].cumulative(space.lower[j]);
+    if (share < kLeastShare) {
+      const std::string name = fmt::format("PARAMETER_{}", j + 1);
+      const SetupSection place = section.has(name) ? section.openItem("PARAMETER_", j + 1) : section;
+      place.refuse(kPriorRefusal, kDistributionKeyword,
+                   fmt::format("the prior of {} has a probability of {:.1g} between the bounds {:g} and {:g} (search "
+                               "scale): expected {:g} or more. The bounds are at {}",
+                               space.names[j], share, space.lower[j], space.upper[j], kLeastShare,
+                               parameter.location("Upper_Bound")));
+    }
+  }
+}
+
+void DreamTask::checkSize(const TaskReading& reading, const SetupSection& section) const {
   constexpr std::int32_t kLeastGenerations = 10;
   if (settings.sampleSize < kLeastGenerations * dream.sampler.chainCount) {
     section.refuse(kSampleSizeRefusal, kSampleSizeKeyword,
                    fmt::format("expected {} model runs for each of the {} chains or more, found {}", kLeastGenerations,
                                dream.sampler.chainCount, settings.sampleSize));
   }
-  const std::size_t dimensions = reading.variableCount + kErrorTermCount;
-  if (const auto tooMany = tooManySets(settings.sampleSize, dimensions)) {
-    section.refuse(kSampleSizeRefusal, kSampleSizeKeyword, fmt::format("{}, found {}", *tooMany, settings.sampleSize));
+  if (const auto tooMany = tooManySets(settings.sampleSize, reading.variableCount + kErrorTermCount)) {
+    section.refuse(kSampleSizeRefusal, kSampleSizeKeyword,
+                   fmt::format("{} ({} of the model and up to {} of its errors), found {}", *tooMany,
+                               reading.variableCount, static_cast<std::size_t>(kErrorTermCount), settings.sampleSize));
   }
 }
 
@@ -67,23 +111,84 @@ std::string DreamTask::description() const {
   return "Uncertainty analysis: posterior distribution by Markov chains, DREAM(ZS)";
 }
 
-std::vector<std::string> DreamTask::summaryLines(const SearchSpace& /*space*/) const {
+std::vector<std::string> DreamTask::summaryLines(const SearchSpace& space) const {
   const DreamSettings& own = dream.sampler;
-  return {fmt::format("Likelihood: {}", kLikelihoodNames[static_cast<std::size_t>(*dream.errors.form)].name),
-          fmt::format("{} chains, at most {} model runs; the first {:g} of them are burn-in", own.chainCount,
-                      own.mostRuns, own.burnInShare * own.mostRuns),
-          fmt::format("They may end before with R-hat at most {:g} and effective sample sizes of at least {:g}",
-                      own.rHatLimit, own.effectiveSize)};
+  std::vector<std::string> lines = distributionLines(prior_, space);
+  lines.insert(lines.end(),
+               {fmt::format("Likelihood: {}", kLikelihoodNames[static_cast<std::size_t>(*dream.errors.form)].name),
+                fmt::format("{} chains, at most {} model runs; the first {:g} of them are burn-in", own.chainCount,
+                            own.mostRuns, own.burnInRuns()),
+                fmt::format("They may end before with R-hat at most {:g} and effective sample sizes of at least {:g}",
+                            own.rHatLimit, own.effectiveSize)});
+  return lines;
+}
+
+std::vector<std::string> DreamTask::warnings(const SearchSpace& space) const {
+  return distributionWarnings(prior_, space);
+}
+
+/// The chains begin as they did, whatever Sample_Size, R_Hat_Limit and Effective_Size are now: burn-in keeps its
+/// length, and model runs that were made are used.
+std::optional<RaisedBudget> DreamTask::raisedBudget(const SearchHistory& history) const {
+  RaisedBudget raised;
+  const int before = history.searches.empty() ? 0 : history.searches.back().lastEvaluation;
+  const int made = std::max(history.evaluations, 1);
+  if (made > before) raised.earlier = EarlierSearch{history.budget, made};
+  if (settings.sampleSize > history.budget) {
+    raised.note = fmt::format("{} was raised from {} to {}: the chains go on where they ended", kSampleSizeKeyword,
+                              history.budget, settings.sampleSize);
+  }
+  if (!raised.earlier && raised.note.empty()) return std::nullopt;
+  return raised;
+}
+
+void DreamTask::continueFrom(const std::vector<EarlierSearch>& searches) {
+  earlierRuns_ = searches;
+  if (searches.empty()) return;
+  dream.sampler.burnInOf = searches.front().maxEvaluations;
+  dream.sampler.leastRuns = searches.back().lastEvaluation;
+}
+
+void DreamTask::requireSets(const SearchSpace& space, const Feasibility& feasibility) const {
+  constexpr int kMostDraws = 100'000;
+  ChainRandom random(1);
+  std::vector<double> unit(prior_.size());
+  std::string reason = "they lie outside the bounds";
+  for (int k = 0; k < kMostDraws; ++k) {
+    for (double& value : unit) value = random.uniform();
+    const ParameterSet set = prior_.setAt(unit);
+    bool isInside = true;
+    for (std::size_t j = 0; j < set.size(); ++j) {
+      isInside = isInside && set[j] >= space.lower[j] && set[j] <= space.upper[j];
+    }
+    if (!isInside) continue;
+    const auto violation = feasibility.violation(set);
+    if (!violation) return;
+    reason = *violation;
+  }
+  fatalError(
+      feasibility.isTested() ? feasibility.noSetMessage()
+                             : "Error: No parameter set found in the prior that can be run",
+      fmt::format("{}: none of {} sets drawn from the prior of DREAM can be run: {}", dream.place, kMostDraws, reason));
 }
 
 TaskOutcome DreamTask::outcomeOf(const TaskContext& context) const {
   TaskOutcome outcome{std::string(kEndOfTask)};
   const ShownDimensions dimensions = target_->shown(context.space);
-  const std::vector<std::vector<double>> prior = target_->priorDraws(kPriorDraws);
+  const std::vector<std::vector<double>> prior = target_->priorDraws(
+      context.feasibility,
+      std::clamp(kMostPriorValues / std::max<std::size_t>(dimensions.names.size(), 1), kLeastPriorDraws, kPriorDraws));
   const auto summary = summarisePosterior(*sampler_, dimensions, prior);
   const std::string correlationFile = fileNameOf(runFilePath(context.filePrefix, run_files::kSampleCorrelation));
   outcome.report = formatPosterior(dream.sampler, *sampler_, dimensions, summary ? &*summary : nullptr,
                                    target_->failures(), correlationFile);
+  if (target_->hasCounted()) {
+    const auto counts = target_->countLines();
+    auto place = outcome.report.begin() + 1;
+    for (const DreamTarget::CountLine& line : counts) {
+      place = outcome.report.insert(place, (line.isWarning ? "Warning: " : "") + line.text) + 1;
+    }
+  }
   outcome.tables.push_back(chainsTable(*sampler_, dimensions));
   if (!summary) return outcome;
   outcome.tables.push_back(posteriorTable(*summary, dimensions));
@@ -98,6 +203,21 @@ TaskOutcome DreamTask::outcomeOf(const TaskContext& context) const {
   return outcome;
 }
 
+/// A failed run is a likelihood of 0 and no fault, but so many of them end any run: what helps is told with the error.
+void DreamTask::advance() {
+  try {
+    sampler_->advance();
+  } catch (const FatalError& error) {
+    if (error.message() != kTooManyFailures) throw;
+    fatalError(error.message(),
+               error.detail() +
+                   "\nDREAM gives the sets of failed runs the likelihood 0 and goes on, but only within this limit. "
+                   "Keep the chains away from where the model fails: narrower bounds, a prior, or an internal "
+                   "constraint, whose violation needs no model run and is no failure here. Where failures are rare "
+                   "behind burn-in, raise Sample_Size and go on with Restart = 1: the limit is a tenth of it");
+  }
+}
+
 TaskOutcome DreamTask::run(const TaskContext& context) {
   target_ = std::make_unique<DreamTarget>(dream, prior_, context);
   for (const std::string& line : target_->descriptionLines()) context.log.line(line);
@@ -108,7 +228,7 @@ TaskOutcome DreamTask::run(const TaskContext& context) {
   bool wasBurningIn = true;
   std::size_t checks = 0;
   while (!sampler_->isFinished()) {
-    sampler_->advance();
+    advance();
     if (wasBurningIn && sampler_->burnIn()) {
       wasBurningIn = false;
       context.log.line(

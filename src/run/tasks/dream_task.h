@@ -20,6 +20,7 @@ class DreamTask final : public Task {
   void read(const TaskReading& reading) override;
   std::string description() const override;
   std::vector<std::string> summaryLines(const SearchSpace& space) const override;
+  std::vector<std::string> warnings(const SearchSpace& space) const override;
   int plannedEvaluations() const override { return settings.sampleSize; }
   int mostAtOnce() const override { return dream.sampler.chainCount; }
   bool drawsRandomNumbers() const override { return true; }
@@ -28,20 +29,28 @@ class DreamTask final : public Task {
   SeriesPrecision keptPrecision() const override { return SeriesPrecision::exact; }
   std::optional<KeptSteps> keptSteps() const override;
   bool usesExactMeasures() const override { return true; }
+  void requireSets(const SearchSpace& space, const Feasibility& feasibility) const override;
   TaskOutcome run(const TaskContext& context) override;
   /// Of the generations that are complete.
   std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const override;
   std::optional<int> evaluationsInBatches() const override { return sampler_ ? sampler_->runs() : 0; }
+  std::optional<RaisedBudget> raisedBudget(const SearchHistory& history) const override;
+  void continueFrom(const std::vector<EarlierSearch>& searches) override;
+  std::vector<EarlierSearch> earlierSearches() const override { return earlierRuns_; }
   TaskReport report() const override { return {.hasBands = true, .chains = &dream.sampler}; }
 
   UncertaintySettings settings;  ///< what all forms of the task have in common
   DreamSection dream;
 
  private:
+  void refuseImpossiblePriors(const TaskReading& reading, const SetupSection& section) const;
+  void checkSize(const TaskReading& reading, const SetupSection& section) const;
+  void advance();
   TaskOutcome outcomeOf(const TaskContext& context) const;
 
   ParameterDistributions prior_;
-  std::unique_ptr<DreamTarget> target_;  ///< of the run
+  std::vector<EarlierSearch> earlierRuns_;  ///< with which this one goes on: the first has told how long burn-in is
+  std::unique_ptr<DreamTarget> target_;     ///< of the run
   std::unique_ptr<DreamSampler> sampler_;
 };
 

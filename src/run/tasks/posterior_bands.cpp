@@ -28,13 +28,10 @@ struct BandStates {
 /// States of all chains at equal distances behind burn-in.
 BandStates bandStates(const DreamSampler& sampler) {
   const ChainHistory& history = sampler.history();
-  const std::size_t first = sampler.burnIn().value_or(history.generations());
-  const std::size_t count = (history.generations() - first) * history.chainCount();
-  const std::size_t stride = std::max<std::size_t>((count + kMostStates - 1) / kMostStates, 1);
   BandStates found;
   std::vector<int> numbers;
-  for (std::size_t k = 0; k < count; k += stride) {
-    const auto state = history.at(first + k / history.chainCount(), k % history.chainCount());
+  for (const ChainHistory::State& state :
+       history.spread(sampler.burnIn().value_or(history.generations()), kMostStates)) {
     if (!(state.logLikelihood > -std::numeric_limits<double>::infinity())) continue;
     found.states.push_back({state.point, 0});
     numbers.push_back(state.evaluation);
@@ -132,6 +129,7 @@ std::vector<std::string> reportPosteriorBands(const TaskContext& context, const 
     }
     first += 2 * observed.values.size();
   }
+  if (report.lines.empty()) return {};
   report.lines.push_back(fmt::format("The bands are of {} states of the posterior and their {} model runs", stateCount,
                                      found.runs.size()));
   return std::move(report.lines);

@@ -256,6 +256,65 @@ TEST(DreamSampler, TheRunEndsOnceTheChainsAgreeAndTheSameSeedMakesTheSameChains)
   EXPECT_NE(chainsOf(2).history().columns(0, 0), first.history().columns(0, 0));
 }
 
+TEST(DreamSampler, BehindAShortBurnInNoChainIsMoved) {
+  // Chains that never move by themselves, one of them far below the others.
+  const auto steps = [](std::span<const double> x) { return x[0] < 0.5 ? -1000.0 : 0.0; };
+  for (const int burnInGenerations : {1, 2, 3}) {
+    SCOPED_TRACE(burnInGenerations);
+    DreamSettings settings = untilBudget(400);
+    settings.chainCount = 8;
+    settings.burnInShare = 8.0 * burnInGenerations / 400.0;
+    DreamProblem problem = sampledFunction({0.0}, {1.0}, steps);
+    int evaluated = 0;
+    problem.evaluate = [&](std::span<const DreamProposal> proposals) {
+      std::vector<ProposalResult> results;
+      const bool isFirst = evaluated == 0;
+      for (std::size_t c = 0; c < proposals.size(); ++c) {
+        const double ofChain = c == 3 ? -1000.0 : 0.0;
+        results.push_back({isFirst ? ofChain : -std::numeric_limits<double>::infinity(), ++evaluated});
+      }
+      return results;
+    };
+    const DreamSampler sampler = sampled(settings, std::move(problem));
+    EXPECT_LE(sampler.outlierCount(), 1);
+    const ChainHistory& history = sampler.history();
+    for (std::size_t g = *sampler.burnIn() + 1; g < history.generations(); ++g) {
+      for (std::size_t c = 0; c < 8; ++c) {
+        EXPECT_EQ(history.at(g, c).evaluation, history.at(*sampler.burnIn(), c).evaluation) << g << ' ' << c;
+      }
+    }
+  }
+}
+
+TEST(ChainHistory, StatesAreSpreadOverAllChainsAlike) {
+  for (const std::size_t chains : {2U, 3U, 4U, 6U}) {
+    ChainHistory history(chains, 1);
+    for (int k = 0; k < 3001; ++k) {
+      const std::vector<double> point{static_cast<double>(k)};
+      history.add({point, 0.0, 0.0, k, false});
+    }
+    for (const std::size_t most : {100U, 500U, 1500U, 10'000U}) {
+      std::vector<std::size_t> ofChains(chains, 0);
+      const std::vector<ChainHistory::State> states = history.spread(100, most);
+      for (const ChainHistory::State& state : states) {
+        ++ofChains[static_cast<std::size_t>(state.evaluation) % chains];
+        EXPECT_GE(state.evaluation, static_cast<int>(100 * chains));
+      }
+      EXPECT_EQ(std::ranges::count(ofChains, ofChains.front()), static_cast<int>(chains)) << chains << ' ' << most;
+      EXPECT_LE(states.size(), most);
+      EXPECT_GE(2 * states.size() + chains, std::min(most, (history.generations() - 100) * chains));
+    }
+  }
+}
+
+TEST(DreamSampler, LargeEffectiveSizesAreReached) {
+  DreamSettings settings;
+  settings.mostRuns = 400'000;
+  settings.effectiveSize = 10'000.0;
+  const DreamSampler sampler = sampled(settings, sampledFunction(times(2, -10.0), times(2, 10.0), lnStandardNormal));
+  EXPECT_EQ(sampler.end(), DreamEnd::converged);
+}
+
 /// z = X b + e with e ~ N(0, s^2 R), and what the likelihood of DREAM is given for it.
 struct LinearCase {
   const char* name;

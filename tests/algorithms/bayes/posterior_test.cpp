@@ -75,7 +75,7 @@ TEST(Posterior, IsOfTheStatesBehindBurnInAndTheAcceptanceRateOfTheirProposals) {
 TEST(Posterior, IsSaidNotToBeThereOrNotToHaveConverged) {
   ShownChains shown;
   const std::vector<std::string> none = shown.report(nullptr, 1);
-  EXPECT_THAT(none, ::testing::Contains(::testing::StartsWith("1 model run failed or without a likelihood")));
+  EXPECT_THAT(none, ::testing::Contains(::testing::StartsWith("1 model run failed or had no likelihood")));
   EXPECT_THAT(none, ::testing::Contains(::testing::HasSubstr("No posterior: there are fewer than 4 generations")));
   auto summary = summarisePosterior(*shown.chains, shown.dimensions, shown.prior);
   EXPECT_THAT(shown.report(&*summary), ::testing::Contains(::testing::HasSubstr("The chains have converged")));
@@ -89,6 +89,17 @@ TEST(Posterior, IsSaidNotToBeThereOrNotToHaveConverged) {
   summary->dimensions[0].effectiveSize = 90.0;
   EXPECT_THAT(shown.report(&*summary),
               ::testing::Contains(::testing::HasSubstr("the effective sample size is below 200 for K (90)")));
+  // One verdict, whatever the chains lack.
+  for (const double rHat : {1.0, 1.3}) {
+    summary->dimensions[1].rHat = rHat;
+    int verdicts = 0;
+    for (const std::string& line : shown.report(&*summary)) {
+      if (line.find("converged") == std::string::npos && line.find("chains agree") == std::string::npos) continue;
+      EXPECT_THAT(line, ::testing::StartsWith("Warning: The chains have not converged: "));
+      ++verdicts;
+    }
+    EXPECT_EQ(verdicts, 1);
+  }
 }
 
 }  // namespace

@@ -22,16 +22,18 @@ TEST(PosteriorWords, SayWhatIsWorstAndWhatToDo) {
   const std::vector<DimensionFigures> few{{"a", 1.01, 399.0, 0.2}, {"b", 1.0, 20.0, 1.2}, {"c", 1.0, 900.0, 1.0}};
   const ConvergenceWords ofFew = convergenceWords(few, limits);
   EXPECT_EQ(ofFew.state, Convergence::fewDraws);
-  EXPECT_THAT(
-      ofFew.findings,
-      ElementsAre(HasSubstr("The chains agree, but the effective sample size is below 400 for b (20), a (399)")));
+  EXPECT_THAT(ofFew.findings,
+              ElementsAre(HasSubstr(
+                  "R-hat is at most 1.05 for all parameters, but the effective sample size is below 400 for b "
+                  "(20), a (399). Means")));
 
   const std::vector<DimensionFigures> apart{
       {"a", 1.2, 9.0, 0.2}, {"b", 1.0, 20.0, 0.95}, {"c", nan, nan, 0.4}, {"d", 1.7, 900.0, 0.95}};
   const ConvergenceWords ofApart = convergenceWords(apart, limits);
   EXPECT_EQ(ofApart.state, Convergence::apart);
-  EXPECT_THAT(ofApart.findings, ElementsAre(HasSubstr("above 1.05 for c (nan), d (1.7), a (1.2). The quantiles"),
-                                            HasSubstr("below 400 for b (20)")));
+  EXPECT_THAT(ofApart.findings,
+              ElementsAre(HasSubstr("above 1.05 for c (nan), d (1.7), a (1.2), and the effective sample "
+                                    "size is below 400 for b (20). The quantiles")));
   const std::vector<std::vector<double>> matrix{
       {1.0, 0.1, -0.95, 0.2}, {0.1, 1.0, nan, 0.69}, {-0.95, nan, 1.0, 0.0}, {0.2, 0.69, 0.0, 1.0}};
   EXPECT_THAT(
