@@ -120,7 +120,7 @@ SobolTask::Drawn SobolTask::draw() const {
   // The numbers of the sets come behind those of the default number of bootstrap samples, whatever their number is, so
   // that a restart with more of them has the same sets.
   UniformGenerator random(randomSeed);
-  ReplicateBootstrap(static_cast<std::size_t>(SobolSettings{}.bootstrapSamples), random);
+  [[maybe_unused]] const ReplicateBootstrap before(static_cast<std::size_t>(SobolSettings{}.bootstrapSamples), random);
   return {random, bootstrap};
 }
 
