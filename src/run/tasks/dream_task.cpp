@@ -113,7 +113,7 @@ std::string DreamTask::description() const {
 
 std::vector<std::string> DreamTask::summaryLines(const SearchSpace& space) const {
   const DreamSettings& own = dream.sampler;
-  std::vector<std::string> lines = distributionLines(prior_, space);
+  std::vector<std::string> lines = distributionLines(prior_, space, kUncertaintySection);
   lines.insert(lines.end(),
                {fmt::format("Likelihood: {}", kLikelihoodNames[static_cast<std::size_t>(*dream.errors.form)].name),
                 fmt::format("{} chains, at most {} model runs; the first {:g} of them are burn-in", own.chainCount,
