@@ -7,8 +7,8 @@
 #include <fmt/format.h>
 
 #include "algorithms/analyses/covariance.h"
-#include "algorithms/searches/glm_step.h"
 #include "algorithms/numbers/uniform_generator.h"
+#include "algorithms/searches/glm_step.h"
 #include "algorithms/surrogate/quadratic_surrogate.h"
 
 namespace mirevo::bench {
@@ -74,9 +74,10 @@ void measureGlm() {
   const double reduced = processorSeconds();
   double moved = 0.0;
   for (const double lambda : {0.0, 0.01, 0.1, 0.001}) moved += model.setFor(lambda).front();
-  fmt::print("GLM with {} parameters and {} observations: {:.2f} s of processor time for the triangle, {:.2f} s for "
-             "four steps\n",
-             kParameters, kObservations, reduced - start, processorSeconds() - reduced);
+  fmt::print(
+      "GLM with {} parameters and {} observations: {:.2f} s of processor time for the triangle, {:.2f} s for "
+      "four steps\n",
+      kParameters, kObservations, reduced - start, processorSeconds() - reduced);
   fmt::print("   the first parameter moves by {} in all\n", moved);
 }
 

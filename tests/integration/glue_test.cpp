@@ -234,7 +234,8 @@ TEST(Glue, CountsASetOfAnEarlierSampleAsOftenAsItWasDrawn) {
 TEST(Glue, OfChainsSaysThatTheirProposalsAreNoSample) {
   const GlueFolder folder;
   folder.writeGlue("Behavioural_Share = 0.2", {.maxEvaluations = 200});
-  folder.editSetup("Uncertainty_Type = 'GLUE'", "Uncertainty_Type = 'DREAM'\n    [DREAM]\n      Likelihood = 'normal'\n    [/DREAM]");
+  folder.editSetup("Uncertainty_Type = 'GLUE'",
+                   "Uncertainty_Type = 'DREAM'\n    [DREAM]\n      Likelihood = 'normal'\n    [/DREAM]");
   const ProgramResult chains = runProgram({folder / "basin.kdx"});
   ASSERT_EQ(chains.exitCode, 0) << chains.error;
   renameResults(folder, "first");

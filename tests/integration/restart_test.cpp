@@ -52,8 +52,7 @@ fi)");
   for (const RunSettings& settings :
        {RunSettings{.algorithm = 1, .usesSurrogate = true, .maxEvaluations = 60},
         RunSettings{.search = "OPSE", .maxEvaluations = 60}, RunSettings{.search = "CMA-ES", .maxEvaluations = 60},
-        RunSettings{.search = "GLM", .maxEvaluations = 30},
-        RunSettings{.option = 3, .maxEvaluations = 40}}) {
+        RunSettings{.search = "GLM", .maxEvaluations = 30}, RunSettings{.option = 3, .maxEvaluations = 40}}) {
     ++kind;
     writeSetup(settings);
     run();

@@ -17,7 +17,6 @@
 namespace mirevo {
 namespace {
 
-
 /// Lines of which the log shows that many.
 constexpr std::size_t kMostNotes = 500;
 /// Batches of trial sets with ever larger lambdas before an iteration gives up.

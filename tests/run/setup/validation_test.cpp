@@ -210,7 +210,8 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
        "0.75 of the range, from 412.5, leaves the bounds 100 to 900 both ways (logarithms)"},
       {"Upper_Bound = 1.0 => 0.31 & Lower_Bound = 0.0 => 0.31", "Lower bound equal to upper bound for parameter Rate",
        "expected more than 0.31 for a search by SCE, PSE, OPSE, CMA-ES or GLM; Parameter_Type = 1 fixes a parameter"},
-      {"Algorithm_Type = 1 => 'GLM' & Transformation_Type = 1 => 2", "Integer parameter Depth in a search by derivatives",
+      {"Algorithm_Type = 1 => 'GLM' & Transformation_Type = 1 => 2",
+       "Integer parameter Depth in a search by derivatives",
        "expected 0 or 1 for GLM, found an integer parameter, by which there are no derivatives; Parameter_Type = 1"},
       {"Algorithm_Type = 1 => 0 & No_Points_Subcomplex = 6 => 8",
        "No. of points in a subcomplex in SCE algorithm invalid", "at most the 7 points of a complex, found 8"},
@@ -256,7 +257,8 @@ TEST_F(ValidationTest, RefusesEachInvalidValueWithItsTextAndPlace) {
        "'PDDS', 'OPSE', 'CMA-ES' or 'GLM', or a job of several processes (MPI), in which SCE runs one proposal of each "
        "complex at once"},
       {"Algorithm_Type = 1 => 0", "Use Population Simplex Evolution algorithm for application with multiple processors",
-       "found 4; several model runs at a time: Algorithm_Type = 'PSE', 'PDDS', 'OPSE', 'CMA-ES' or 'GLM', or a job of several "
+       "found 4; several model runs at a time: Algorithm_Type = 'PSE', 'PDDS', 'OPSE', 'CMA-ES' or 'GLM', or a job of "
+       "several "
        "processes "
        "(MPI)"},
       {"Algorithm_Type = 1 => 'PDDS' & Max_No_Evaluations = 500 => 0",
@@ -344,8 +346,9 @@ using RowInSetup = std::tuple<const SectionRow*, const KeywordRow*, std::string>
 std::vector<RowInSetup> rowsInSetups(const std::string& setup) {
   static const std::pair<std::string_view, const char*> kOptions[] = {
       {"SCENARIOS", "0"}, {"SENSITIVITY_ANALYSIS", "1"}, {"UNCERTAINTY_ESTIMATION", "3"}};
-  static const std::pair<std::string_view, const char*> kAlgorithms[] = {
-      {"SCE_", "0"}, {"DDS_", "2"}, {"PDDS_", "'PDDS'"}, {"OPSE_", "'OPSE'"}, {"CMAES_", "'CMA-ES'"}, {"GLM_", "'GLM'"}};
+  static const std::pair<std::string_view, const char*> kAlgorithms[] = {{"SCE_", "0"},          {"DDS_", "2"},
+                                                                         {"PDDS_", "'PDDS'"},    {"OPSE_", "'OPSE'"},
+                                                                         {"CMAES_", "'CMA-ES'"}, {"GLM_", "'GLM'"}};
   // Forms of the sensitivity analysis with a section of their own, and what that needs.
   static const std::tuple<std::string_view, const char*, const char*> kForms[] = {
       {"MORRIS", "'Morris'", ""}, {"SOBOL", "'Sobol'", "Sample_Size = 64\n"}};
