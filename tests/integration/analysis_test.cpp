@@ -456,7 +456,7 @@ TEST(Uncertainty, ABandOfStepsGoesThroughGapsAndBehindThePeriodAndARestartNeedsT
   folder.write("model/simulated.csv", observed);
   const std::string setup = folder.writeSetup({.option = 3, .restart = 1});
   folder.editSetup("End_Date = 2001-12-31", "End_Date = 2001-11-30");
-  folder.editSetup("Sample_Size", "Band_Times = 'steps'\n    Band_End_Date = 2001-12-31\n    Sample_Size");
+  folder.editSetup("\n    Sample_Size", "\n    Band_Times = 'steps'\n    Band_End_Date = 2001-12-31\n    Sample_Size");
   ASSERT_EQ(runProgram({setup}).exitCode, 0) << folder.read("basin.log");
   const std::string band = folder.read("basin_Band_1.csv");
   EXPECT_EQ(occurrences(band, "\n2001-"), 366);

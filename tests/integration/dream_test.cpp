@@ -168,7 +168,7 @@ TEST(Dream, ItsBandsReachIntoAValidationPeriodThatBearsOnNoLikelihood) {
   };
   ASSERT_EQ(runProgram({write()}).exitCode, 0) << folder.read("basin.log");
   const std::string chains = folder.read("basin_Chains.dat");
-  EXPECT_THAT(folder.read("basin.log"), HasSubstr("\nLikelihood of 273 observations\n"));
+  EXPECT_THAT(folder.read("basin.log"), HasSubstr("\nThe likelihood is of all 273 observations of flow\n"));
   EXPECT_THAT(folder.read("basin.log"),
               HasSubstr("\nBand of total uncertainty of flow in autumn (validation): 100.0 % of 92 observations lie"));
   // A flood in autumn: the posterior is the same, and the band does not hold it.
