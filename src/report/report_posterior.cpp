@@ -266,9 +266,10 @@ void takeChecks(const NamedTable& checks, ReportedPosterior& posterior) {
 bool takeCorrelations(const NamedTable& correlation, ReportedPosterior& posterior) {
   std::vector<std::vector<double>> matrix;
   for (const std::vector<std::string>& cells : correlation.table.rows) {
-    std::vector<double>& row = matrix.emplace_back();
+    std::vector<double> row;
     for (std::size_t k = 1; k < cells.size(); ++k) row.push_back(realCell(cells[k]).value_or(kNaN));
     if (row.size() != posterior.dimensions.size()) return false;
+    matrix.push_back(std::move(row));
   }
   if (matrix.size() != posterior.dimensions.size()) return false;
   posterior.correlations = std::move(matrix);
