@@ -7,6 +7,7 @@
 #include <map>
 #include <numeric>
 #include <string_view>
+#include <utility>
 
 #include <fmt/format.h>
 
