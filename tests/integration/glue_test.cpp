@@ -257,7 +257,8 @@ TEST(Glue, OfChainsSaysThatTheirProposalsAreNoSampleOfTheParameters) {
   }
   folder.writeGlue("Behavioural_Share = 0.2\nEarlier_Result_File = 'chains.dat'");
   ASSERT_EQ(runProgram({folder / "basin.kdx"}).exitCode, 0) << folder.read("basin.log");
-  EXPECT_THAT(folder.read("basin.log"), HasSubstr(" are those of a DREAM run, the proposals of its chains with those that were rejected "));
+  EXPECT_THAT(folder.read("basin.log"),
+              HasSubstr(" are those of a DREAM run, the proposals of its chains with those that were rejected "));
   EXPECT_FALSE(folder.exists("basin_SampleSensitivities.dat"));
 }
 
