@@ -24,9 +24,7 @@ class MorrisTask final : public Task {
   void requireSets(const SearchSpace& space, const Feasibility& feasibility) const override;
   TaskOutcome run(const TaskContext& context) override;
   std::optional<TaskOutcome> unfinishedOutcome(const TaskContext& context, const UnfinishedBatch& made) const override;
-  TaskReport report() const override {
-    return {.hasMorris = true, .distributions = distributions ? &*distributions : nullptr};
-  }
+  TaskReport report() const override { return {.hasMorris = true}; }
 
   MorrisSettings settings;
   /// Without one, each parameter is uniform between its bounds.
