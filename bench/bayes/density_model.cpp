@@ -5,7 +5,7 @@
 #include <string_view>
 #include <vector>
 
-#include "known_densities.h"
+#include "algorithms/bayes/known_densities.h"
 
 int main(int argc, char** argv) {
   if (argc != 2) return 2;
@@ -14,7 +14,7 @@ int main(int argc, char** argv) {
   if (in == nullptr) return 1;
   for (double value = 0.0; std::fscanf(in, "%lf", &value) == 1;) values.push_back(value);
   std::fclose(in);
-  for (const mirevo::bench::KnownDensity& density : mirevo::bench::knownDensities()) {
+  for (const mirevo::testing::KnownDensity& density : mirevo::testing::knownDensities()) {
     if (density.name != std::string_view(argv[1]) || density.dimensions != values.size()) continue;
     std::FILE* const out = std::fopen("result.txt", "w");
     if (out == nullptr) return 1;

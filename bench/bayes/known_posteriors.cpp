@@ -12,14 +12,16 @@
 
 #include <fmt/format.h>
 
+#include "algorithms/bayes/known_densities.h"
 #include "common/data_table.h"
 #include "common/files.h"
-#include "known_densities.h"
 
 namespace mirevo::bench {
 namespace {
 
 namespace fs = std::filesystem;
+using testing::knownDensities;
+using testing::KnownDensity;
 
 void write(const fs::path& path, const std::string& text) {
   std::ofstream(path) << text;

@@ -197,10 +197,8 @@ EarlierSample GlueTask::emptySample(const TaskContext& context) const {
 
 std::vector<std::string> GlueTask::setDoubts(const SearchSpace& /*space*/, const Feasibility& feasibility) const {
   if (isOfEarlierRun() || settings.redrawsInfeasible || !feasibility.isTested()) return {};
-  const InfeasibleSets found =
-      infeasibleSets(feasibility, drawSample(feasibility).sets, kWhatSets, settings.sampleSize, kInfeasibleRemedy);
-  if (found.text.empty()) return {};
-  return {found.text};
+  return infeasibleSets(feasibility, drawSample(feasibility).sets, kWhatSets, settings.sampleSize, kInfeasibleRemedy)
+      .texts();
 }
 
 EarlierSample GlueTask::evaluateSample(const TaskContext& context) const {

@@ -3,6 +3,7 @@
 #include <span>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "common/parameter_set.h"
 #include "run/tasks/task.h"
@@ -13,6 +14,9 @@ namespace mirevo {
 struct InfeasibleSets {
   std::string text;      ///< empty: there are none
   bool endsRun = false;  ///< more of them than may fail
+
+  /// As Task::setDoubts() returns it.
+  std::vector<std::string> texts() const { return text.empty() ? std::vector<std::string>() : std::vector{text}; }
 };
 /// As the following; for the user where the run will end early.
 InfeasibleSets infeasibleSets(const Feasibility& feasibility, std::span<const ParameterSet> sets, std::string_view what,

@@ -206,10 +206,7 @@ std::vector<std::string> SobolTask::setDoubts(const SearchSpace& /*space*/, cons
   if (!feasibility.isTested()) return {};
   UniformGenerator random = draw().random;
   const std::vector<ParameterSet> sets = sobolSets(design_, factors_, distributions_, random);
-  const InfeasibleSets found =
-      infeasibleSets(feasibility, sets, kWhatSets, static_cast<int>(sets.size()), kInfeasibleRemedy);
-  if (found.text.empty()) return {};
-  return {found.text};
+  return infeasibleSets(feasibility, sets, kWhatSets, static_cast<int>(sets.size()), kInfeasibleRemedy).texts();
 }
 
 TaskOutcome SobolTask::outcomeOf(const TaskContext& context, std::span<const EvaluationResult> results,

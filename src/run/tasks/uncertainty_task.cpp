@@ -94,10 +94,9 @@ void UncertaintyTask::requireSets(const SearchSpace& /*space*/, const Feasibilit
 std::vector<std::string> UncertaintyTask::setDoubts(const SearchSpace& /*space*/,
                                                     const Feasibility& feasibility) const {
   if (settings.redrawsInfeasible || !feasibility.isTested() || settings.distributions.size() == 0) return {};
-  const InfeasibleSets found = infeasibleSets(feasibility, uncertaintySample(settings, randomSeed, {}), kWhatSets,
-                                              settings.sampleSize, kInfeasibleRemedy);
-  if (found.text.empty()) return {};
-  return {found.text};
+  return infeasibleSets(feasibility, uncertaintySample(settings, randomSeed, {}), kWhatSets, settings.sampleSize,
+                        kInfeasibleRemedy)
+      .texts();
 }
 
 /// `acceptance`: a line on the sets drawn, if any can be drawn again.

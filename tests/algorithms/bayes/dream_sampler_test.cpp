@@ -7,6 +7,7 @@
 
 #include <gtest/gtest.h>
 
+#include "algorithms/bayes/known_densities.h"
 #include "algorithms/bayes/likelihoods.h"
 #include "algorithms/bayes/sampled_function.h"
 
@@ -24,20 +25,10 @@ double lnStandardNormal(std::span<const double> x) {
 }
 
 TEST(DreamSampler, TwoPeaksOfAMixtureHaveTheirShares) {
-  // 1/3 N(-5, I) + 2/3 N(5, I) in ten dimensions: mean 5/3, variance 1 + 25 - 25/9.
-  const auto mixture = [](std::span<const double> x) {
-    double low = 0.0;
-    double high = 0.0;
-    for (const double value : x) {
-      low -= 0.5 * (value + 5.0) * (value + 5.0);
-      high -= 0.5 * (value - 5.0) * (value - 5.0);
-    }
-    const double top = std::max(low, high);
-    return top + std::log(std::exp(low - top) / 3.0 + 2.0 * std::exp(high - top) / 3.0);
-  };
   DreamSettings settings = untilBudget(500'000);
   settings.chainCount = 5;
-  const DreamSampler sampler = sampled(settings, sampledFunction(times(10, -20.0), times(10, 20.0), mixture));
+  const DreamSampler sampler =
+      sampled(settings, sampledFunction(times(10, -20.0), times(10, 20.0), testing::lnTwoPeaks));
   for (std::size_t j = 0; j < 10; ++j) expectMoments(sampler, j, 1.6667, 4.8189);
   const std::vector<double> values = posteriorOf(sampler, 0);
   const auto high = std::ranges::count_if(values, [](double value) { return value > 0.0; });
@@ -45,34 +36,18 @@ TEST(DreamSampler, TwoPeaksOfAMixtureHaveTheirShares) {
 }
 
 TEST(DreamSampler, HundredCorrelatedDimensionsKeepTheirMoments) {
-  // The variance of dimension j is j, all correlations are 0.5.
   constexpr std::size_t kDimension = 100;
-  const auto normal = [](std::span<const double> x) {
-    double squares = 0.0;
-    double sum = 0.0;
-    for (std::size_t j = 0; j < x.size(); ++j) {
-      const double z = x[j] / std::sqrt(static_cast<double>(j + 1));
-      squares += z * z;
-      sum += z;
-    }
-    return -(squares - sum * sum / static_cast<double>(x.size() + 1));
-  };
   DreamSettings settings = untilBudget(150'000);
   settings.burnInShare = 0.5;
   const DreamSampler sampler =
-      sampled(settings, sampledFunction(times(kDimension, -50.0), times(kDimension, 50.0), normal));
+      sampled(settings, sampledFunction(times(kDimension, -50.0), times(kDimension, 50.0), testing::lnCorrelated));
   for (std::size_t j = 0; j < kDimension; j += 9) expectMoments(sampler, j, 0.0, std::sqrt(static_cast<double>(j + 1)));
 }
 
 TEST(DreamSampler, ATwistedNormalKeepsItsShape) {
-  // x_1 ~ N(0, 100), x_2 + 0.1 x_1^2 - 10 ~ N(0, 1), the others N(0, 1): a bent ridge, of which no bound takes the
-  // ends.
-  const auto twisted = [](std::span<const double> x) {
-    const double bent = x[1] + 0.1 * x[0] * x[0] - 10.0;
-    return -0.005 * x[0] * x[0] - 0.5 * bent * bent + lnStandardNormal(x.subspan(2));
-  };
+  // No bound takes the ends of the ridge.
   const DreamSampler sampler =
-      sampled(untilBudget(400'000), sampledFunction(times(10, -300.0), times(10, 300.0), twisted), 3);
+      sampled(untilBudget(400'000), sampledFunction(times(10, -300.0), times(10, 300.0), testing::lnTwisted), 3);
   expectMoments(sampler, 0, 0.0, 10.0);
   expectMoments(sampler, 1, 0.0, std::sqrt(201.0), 15.0);
   for (std::size_t j = 2; j < 10; ++j) expectMoments(sampler, j, 0.0, 1.0);

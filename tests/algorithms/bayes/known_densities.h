@@ -4,13 +4,11 @@
 #include <cmath>
 #include <cstddef>
 #include <span>
-#include <string>
 #include <string_view>
-#include <vector>
 
 /// Distributions that are known, which stand for the posterior of a model: logarithms of their densities, but for a
 /// constant.
-namespace mirevo::bench {
+namespace mirevo::testing {
 
 /// 1/3 N(-5, I) + 2/3 N(5, I): mean 5/3, variance 1 + 25 - 25/9.
 inline double lnTwoPeaks(std::span<const double> x) {
@@ -66,4 +64,4 @@ inline std::span<const KnownDensity> knownDensities() {
   return all;
 }
 
-}  // namespace mirevo::bench
+}  // namespace mirevo::testing
