@@ -6,7 +6,6 @@
 #include <cstdio>
 #include <cstdlib>
 #include <filesystem>
-#include <fstream>
 #include <string>
 #include <vector>
 
@@ -15,6 +14,7 @@
 #include "algorithms/bayes/known_densities.h"
 #include "common/data_table.h"
 #include "common/files.h"
+#include "program_case.h"
 
 namespace mirevo::bench {
 namespace {
@@ -23,109 +23,31 @@ namespace fs = std::filesystem;
 using testing::knownDensities;
 using testing::KnownDensity;
 
-void write(const fs::path& path, const std::string& text) {
-  std::ofstream(path) << text;
-}
-
-std::string setupText(const KnownDensity& density, int runs) {
-  std::string parameters;
-  for (std::size_t j = 1; j <= density.dimensions; ++j) {
-    parameters += fmt::format(
-        "[PARAMETER_{0}]\nParameter_Name = 'x{0}'\nInitial_Value = 0.0\nLower_Bound = {1}\nUpper_Bound = {2}\n"
-        "Transformation_Type = 0\nParameter_Type = 0\n[/PARAMETER_{0}]\n",
-        j, -density.bound, density.bound);
-  }
-  return fmt::format(R"([MIREVO_PARAMETERS]
-[MIREVO_SIMULATION_OPTION]
-Option = 3
-Title = '{0}'
-Report = 0
-[SIMBATCH]
-TqSEKdxListItemCount = 1
-[SIMBATCHITEM_1]
-BatchFileName = 'model/run.sh'
-Arguments = ''
-[/SIMBATCHITEM_1]
-[/SIMBATCH]
-[SIMPARAM]
-TqSEKdxListItemCount = 1
-[SIMPARAMITEM_1]
-FileType = 0
-ParamFileName = 'model/parameters.txt'
-TemplateFileName = 'model/parameters.tpl'
-[/SIMPARAMITEM_1]
-[/SIMPARAM]
-[/MIREVO_SIMULATION_OPTION]
-[MODEL_PARAMETERS]
-TqSEKdxListItemCount = {1}
-{2}[INTERNAL_CONSTRAINTS]
-TqSEKdxListItemCount = 0
-[/INTERNAL_CONSTRAINTS]
-[/MODEL_PARAMETERS]
-[ObjectiveFunctions]
-Start_Date = 2001-01-01
-End_Date = 2001-12-31
-Aggregation_Method = 0
-[OUTPUT_MEASURES]
-TqSEKdxListItemCount = 1
-[MEASURE_1]
-Name = 'minus log-density'
-Interface_Type = 1
-MeasurementNo = 1
-Statistic_Type = 1
-Weight = 1.0
-Weight_Above = 1.0
-Function_Name = 'unlikely'
-[/MEASURE_1]
-[OUTPUT_MEASURE_FILE]
-File_Name = 'model/result.txt'
-[/OUTPUT_MEASURE_FILE]
-[/OUTPUT_MEASURES]
-[OBJECTIVE_FUNCTIONS]
-TqSEKdxListItemCount = 1
-[OBJECTIVE_1]
-Name = 'unlikely'
-Function_Type = 0
-Weight = 1.0
-[/OBJECTIVE_1]
-[/OBJECTIVE_FUNCTIONS]
-[/ObjectiveFunctions]
-[SAVE_OUTPUT_FILES]
-TqSEKdxListItemCount = 0
-[/SAVE_OUTPUT_FILES]
-[UNCERTAINTY_ESTIMATION]
+void writeDensityCase(const fs::path& folder, const KnownDensity& density, int runs) {
+  ProgramCase one{.option = "3\nReport = 0",
+                  .title = std::string(density.name),
+                  .name = "minus log-density",
+                  .interfaceType = 1,
+                  .measureFile = "model/result.txt",
+                  .task = fmt::format(R"([UNCERTAINTY_ESTIMATION]
 Uncertainty_Type = 'DREAM'
-Sample_Size = {3}
+Sample_Size = {}
 Random_Seed = 1
 [DREAM]
 Likelihood = 'objective'
 Objective_Function = 1
-Chain_Count = {4}
+Chain_Count = {}
 Effective_Size = 1000
 [/DREAM]
 [/UNCERTAINTY_ESTIMATION]
-[SimultaneousSimulations]
-NoSimultaneousSim = 2
-UseSingleThread = 0
-[/SimultaneousSimulations]
-[/MIREVO_PARAMETERS]
 )",
-                     density.name, density.dimensions, parameters, runs, density.chains);
-}
-
-void writeCase(const fs::path& folder, const KnownDensity& density, int runs) {
-  fs::create_directories(folder / "model");
-  std::string values;
-  std::string places = "!\n";
+                                      runs, density.chains),
+                  .slots = 2,
+                  .modelCommand = fmt::format("{} {}", DENSITY_MODEL, density.name)};
   for (std::size_t j = 1; j <= density.dimensions; ++j) {
-    values += "0.0\n";
-    places += fmt::format("!{:<24}!\n", fmt::format("x{}", j));
+    one.parameters.push_back({fmt::format("x{}", j), 0.0, -density.bound, density.bound});
   }
-  write(folder / "model/parameters.txt", values);
-  write(folder / "model/parameters.tpl", places);
-  write(folder / "model/run.sh", fmt::format("#!/bin/sh\nexec {} {}\n", DENSITY_MODEL, density.name));
-  fs::permissions(folder / "model/run.sh", fs::perms::owner_all);
-  write(folder / "case.kdx", setupText(density, runs));
+  writeCase(folder, one);
 }
 
 double cellOf(const ReadTable& table, const std::vector<std::string>& row, const char* column) {
@@ -149,7 +71,7 @@ double shareAbove(const fs::path& chains) {
 bool measure(const KnownDensity& density, int runs) {
   const fs::path folder = fs::temp_directory_path() / fmt::format("known-posterior-{}", density.name);
   fs::remove_all(folder);
-  writeCase(folder, density, runs);
+  writeDensityCase(folder, density, runs);
   const std::string command =
       fmt::format("cd {} && VOLK_PROGRESS=NONE {} case.kdx >/dev/null 2>output.txt", folder.string(), MIREVO_PROGRAM);
   if (std::system(command.c_str()) != 0) {

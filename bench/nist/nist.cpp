@@ -15,6 +15,7 @@
 #include <fmt/format.h>
 
 #include "algorithms/strd_functions.h"
+#include "program_case.h"
 #include "strd_file.h"
 
 namespace mirevo::bench {
@@ -31,66 +32,11 @@ double digitsOf(double value, double certified) {
   return std::clamp(error > 0.0 ? -std::log10(error) : kMostDigits, 0.0, kMostDigits);
 }
 
-void write(const fs::path& path, const std::string& text) {
-  std::ofstream(path) << text;
-}
-
 std::string dayOf(std::size_t i) {
   return fmt::format("{:04}-{:02}-{:02}", 2001 + i / 336, 1 + i / 28 % 12, 1 + i % 28);
 }
 
-std::string setupText(const StrdSet& set, int start) {
-  std::string parameters;
-  for (std::size_t j = 0; j < set.certified.size(); ++j) {
-    const double values[] = {set.starts[0][j], set.starts[1][j], set.certified[j]};
-    const auto [least, most] = std::ranges::minmax(values);
-    const double size = std::max(std::abs(least), std::abs(most));
-    parameters += fmt::format(
-        "[PARAMETER_{}]\nParameter_Name = 'b{}'\nInitial_Value = {:.17g}\nLower_Bound = {:.17g}\nUpper_Bound = "
-        "{:.17g}\nTransformation_Type = 0\nParameter_Type = 0\n[/PARAMETER_{}]\n",
-        j + 1, j + 1, set.starts[start][j], least - 2.0 * size, most + 2.0 * size, j + 1);
-  }
-  return fmt::format(R"([MIREVO_PARAMETERS]
-[MIREVO_SIMULATION_OPTION]
-Option = 2
-Title = '{}'
-[SIMBATCH]
-TqSEKdxListItemCount = 1
-[SIMBATCHITEM_1]
-BatchFileName = 'model/run.sh'
-Arguments = ''
-[/SIMBATCHITEM_1]
-[/SIMBATCH]
-[SIMPARAM]
-TqSEKdxListItemCount = 1
-[SIMPARAMITEM_1]
-FileType = 0
-ParamFileName = 'model/parameters.txt'
-TemplateFileName = 'model/parameters.tpl'
-[/SIMPARAMITEM_1]
-[/SIMPARAM]
-[/MIREVO_SIMULATION_OPTION]
-[MODEL_PARAMETERS]
-TqSEKdxListItemCount = {}
-{}[INTERNAL_CONSTRAINTS]
-TqSEKdxListItemCount = 0
-[/INTERNAL_CONSTRAINTS]
-[/MODEL_PARAMETERS]
-[ObjectiveFunctions]
-Start_Date = 2001-01-01
-End_Date = {}
-Aggregation_Method = 0
-[OUTPUT_MEASURES]
-TqSEKdxListItemCount = 1
-[MEASURE_1]
-Name = 'squares'
-Interface_Type = 0
-MeasurementNo = 1
-Statistic_Type = 'sum of squared errors'
-Weight = 1.0
-Weight_Above = 1.0
-Function_Name = 'squares'
-[SIMULATION_FILE]
+constexpr const char* kSeriesFiles = R"([SIMULATION_FILE]
 File_Name = 'model/simulated.csv'
 Item_No = 1
 [/SIMULATION_FILE]
@@ -98,24 +44,8 @@ Item_No = 1
 File_Name = 'observed.csv'
 Item_No = 1
 [/OBSERVATION_FILE]
-[/MEASURE_1]
-[OUTPUT_MEASURE_FILE]
-File_Name = ''
-[/OUTPUT_MEASURE_FILE]
-[/OUTPUT_MEASURES]
-[OBJECTIVE_FUNCTIONS]
-TqSEKdxListItemCount = 1
-[OBJECTIVE_1]
-Name = 'squares'
-Function_Type = 0
-Weight = 1.0
-[/OBJECTIVE_1]
-[/OBJECTIVE_FUNCTIONS]
-[/ObjectiveFunctions]
-[SAVE_OUTPUT_FILES]
-TqSEKdxListItemCount = 0
-[/SAVE_OUTPUT_FILES]
-[OPTIMISATION_ALGORITHM]
+)";
+constexpr const char* kTask = R"([OPTIMISATION_ALGORITHM]
 Algorithm_Type = 'GLM'
 Use_Surrogate_Model = 0
 [GLM_CONTROL_PARAMETERS]
@@ -135,31 +65,27 @@ Max_No_Evaluations = 3000
 Min_Change = 0
 [/STOPPING_CRITERIA]
 [/OPTIMISATION_ALGORITHM]
-[SimultaneousSimulations]
-NoSimultaneousSim = 1
-UseSingleThread = 0
-[/SimultaneousSimulations]
-[/MIREVO_PARAMETERS]
-)",
-                     set.name, set.certified.size(), parameters, dayOf(set.y.size() - 1));
-}
+)";
 
-void writeCase(const fs::path& folder, const std::string& data, const StrdSet& set, int start) {
-  fs::create_directories(folder / "model");
-  std::string values;
-  std::string places = "!\n";
+void writeStrdCase(const fs::path& folder, const std::string& data, const StrdSet& set, int start) {
+  ProgramCase one{.option = "2",
+                  .title = set.name,
+                  .endDate = dayOf(set.y.size() - 1),
+                  .name = "squares",
+                  .statistic = "'sum of squared errors'",
+                  .seriesFiles = kSeriesFiles,
+                  .task = kTask,
+                  .modelCommand = fmt::format("{} {} {}", NIST_MODEL, data, set.name)};
   for (std::size_t j = 0; j < set.certified.size(); ++j) {
-    values += fmt::format("{:.17g}\n", set.starts[start][j]);
-    places += fmt::format("!{:<24}!\n", fmt::format("b{}", j + 1));
+    const double values[] = {set.starts[0][j], set.starts[1][j], set.certified[j]};
+    const auto [least, most] = std::ranges::minmax(values);
+    const double size = std::max(std::abs(least), std::abs(most));
+    one.parameters.push_back({fmt::format("b{}", j + 1), set.starts[start][j], least - 2.0 * size, most + 2.0 * size});
   }
-  write(folder / "model/parameters.txt", values);
-  write(folder / "model/parameters.tpl", places);
-  write(folder / "model/run.sh", fmt::format("#!/bin/sh\nexec {} {} {}\n", NIST_MODEL, data, set.name));
-  fs::permissions(folder / "model/run.sh", fs::perms::owner_all);
+  writeCase(folder, one);
   std::string observed = "time,y\n";
   for (std::size_t i = 0; i < set.y.size(); ++i) observed += fmt::format("{},{:.17g}\n", dayOf(i), set.y[i]);
-  write(folder / "observed.csv", observed);
-  write(folder / "case.kdx", setupText(set, start));
+  writeText(folder / "observed.csv", observed);
 }
 
 /// The cells of the line of a parameter in the table of limits; empty if there is none.
@@ -190,7 +116,7 @@ void measure(const std::string& data, const std::string& name) {
   for (const int start : {0, 1}) {
     const fs::path folder = fs::temp_directory_path() / fmt::format("nist-{}-{}", name, start + 1);
     fs::remove_all(folder);
-    writeCase(folder, data, set, start);
+    writeStrdCase(folder, data, set, start);
     const std::string prepare =
         fmt::format("cd {0}/model && ./run.sh && cd .. && VOLK_PROGRESS=NONE {1} case.kdx >/dev/null 2>&1",
                     folder.string(), MIREVO_PROGRAM);
