@@ -62,6 +62,7 @@ TEST(Constraints, AreTestedBeforeTheFirstRunOfASensitivityAnalysisAndOfScenarios
         {{.option = 0, .scenarios = {"4, 1, 1", "5, 2, 1"}}, "'a + b + 2.5'", none}}) {
     runConstrained(folder, settings);
     folder.editSetup("'a + b'", equation);
+    EXPECT_THAT(runProgram({"--check", folder / "basin.kdx"}).output, HasSubstr(said));
     const ProgramResult run = runProgram({folder / "basin.kdx"});
     EXPECT_EQ(run.exitCode, 1);
     EXPECT_THAT(run.error, HasSubstr(said));

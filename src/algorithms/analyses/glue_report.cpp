@@ -210,23 +210,29 @@ std::vector<std::string> glueWarnings(const EvaluatedSample& sample, const GlueW
   std::vector<std::string> warnings;
   if (weights.undefinedCount > 0) {
     warnings.push_back(
-        fmt::format("{} of {} behavioural sets have a negative error, for which there is no likelihood "
-                    "'{}', and weigh nothing; '{}' takes any value",
-                    weights.undefinedCount, weights.behavioural.size(),
+        fmt::format("{} of {} {} a negative error, for which there is no likelihood '{}', and {} nothing; '{}' takes "
+                    "any value",
+                    weights.undefinedCount, countText(weights.behavioural.size(), "behavioural set"),
+                    weights.undefinedCount == 1 ? "has" : "have",
                     kGlueLikelihoodNames[static_cast<std::size_t>(settings.likelihood)].name,
+                    weights.undefinedCount == 1 ? "weighs" : "weigh",
                     kGlueLikelihoodNames[static_cast<std::size_t>(LikelihoodShape::rescaled)].name));
   }
   if (!weights.hasWeights()) {
-    warnings.push_back(
-        fmt::format("The likelihood of all {} behavioural sets is 0, and there are neither quantiles "
-                    "nor bands. {}, and so does one with another {}",
-                    weights.behavioural.size(), again, kGlueLikelihoodKeyword));
+    warnings.push_back(fmt::format(
+        "The likelihood of {} is 0, and there are neither quantiles nor bands. {}, and so does one with "
+        "another {}",
+        weights.behavioural.size() == 1 ? "the one behavioural set"
+                                        : fmt::format("all {} behavioural sets", weights.behavioural.size()),
+        again, kGlueLikelihoodKeyword));
     return warnings;
   }
   const std::size_t weighing = weights.behavioural.size() - weights.unweightedCount;
   if (weights.unweightedCount > weights.undefinedCount) {
-    warnings.push_back(fmt::format("{} of {} behavioural sets weigh nothing, as their likelihood is 0",
-                                   weights.unweightedCount - weights.undefinedCount, weights.behavioural.size()));
+    const std::size_t without = weights.unweightedCount - weights.undefinedCount;
+    warnings.push_back(fmt::format("{} of {} {} nothing, as {} likelihood is 0", without,
+                                   countText(weights.behavioural.size(), "behavioural set"),
+                                   without == 1 ? "weighs" : "weigh", without == 1 ? "its" : "their"));
   }
   if (static_cast<double>(weighing) < kFewSets) {
     warnings.push_back(fmt::format(

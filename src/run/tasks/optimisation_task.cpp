@@ -25,6 +25,7 @@ namespace mirevo {
 namespace {
 
 constexpr std::string_view kAlgorithmKeyword = "Algorithm_Type";
+constexpr std::string_view kWhatGivenSets = "given sets of the initial sample";
 constexpr std::string_view kSurrogateKeyword = "Use_Surrogate_Model";
 constexpr std::string_view kInvalidEarlierFile = "Error: Earlier result file invalid";
 
@@ -468,28 +469,37 @@ int OptimisationTask::mostAtOnce() const {
   return most == 0 ? plannedEvaluations() : static_cast<int>(std::min<std::int64_t>(most, plannedEvaluations()));
 }
 
-/// Warns of sets of the initial sample that are not drawn and cannot be run.
-void OptimisationTask::warnOfGivenSets(const TaskContext& context, const SearchProblem& problem) const {
+/// The sets of the initial sample that are not drawn, but for the initial values; search scale.
+std::vector<ParameterSet> OptimisationTask::givenSample(const SearchSpace& space) const {
+  if (!method->facts().drawsInitialSample || initialSample.generation != SampleGeneration::fromFile) {
+    return earlierSets_.sets;
+  }
+  return sampleText_ ? readInitialSample(initialSample.fileName, *sampleText_, space).sets
+                     : loadInitialSample(initialSample.fileName, space).sets;
+}
+
+/// The first sets of the search, as far as they are not drawn.
+std::vector<ParameterSet> OptimisationTask::givenSets(const SearchSpace& space) const {
   std::vector<ParameterSet> given;
-  if (initialSample.includeInitialParameters) given.push_back(problem.bounds.initial);
-  given.insert(given.end(), problem.givenSample.begin(), problem.givenSample.end());
+  if (initialSample.includeInitialParameters) given.push_back(searchBounds(space).initial);
+  for (ParameterSet& set : givenSample(space)) given.push_back(std::move(set));
   const std::int64_t population = method->populationSize();
   const auto most = static_cast<std::size_t>(
       std::min<std::int64_t>(population > 0 ? population : std::ssize(given), stopping.maxEvaluations));
   if (given.size() > most) given.resize(most);
-  warnOfInfeasibleSets(context, given, "given sets of the initial sample", stopping.maxEvaluations);
+  return given;
+}
+
+std::vector<std::string> OptimisationTask::setDoubts(const SearchSpace& space, const Feasibility& feasibility) const {
+  if (!method || !feasibility.isTested()) return {};
+  return infeasibleSets(feasibility, givenSets(space), kWhatGivenSets, stopping.maxEvaluations).texts();
 }
 
 SearchProblem OptimisationTask::problemOf(const SearchSpace& space, const Feasibility& feasibility,
                                           Evaluator& evaluator, UniformGenerator& random) const {
   SearchProblem problem{searchBounds(space), stopping, initialSample, {}, evaluator, random};
   problem.earlierSearches = earlierSearches_;
-  if (method->facts().drawsInitialSample && initialSample.generation == SampleGeneration::fromFile) {
-    problem.givenSample = sampleText_ ? readInitialSample(initialSample.fileName, *sampleText_, space).sets
-                                      : loadInitialSample(initialSample.fileName, space).sets;
-  } else {
-    problem.givenSample = earlierSets_.sets;
-  }
+  problem.givenSample = givenSample(space);
   problem.feasibility = feasibility;
   return problem;
 }
@@ -507,7 +517,9 @@ void OptimisationTask::requireSets(const SearchSpace& space, const Feasibility& 
 SearchSummary OptimisationTask::search(const TaskContext& context, Evaluator& evaluator) {
   UniformGenerator random(randomSeed);
   SearchProblem problem = problemOf(context.space, context.feasibility, evaluator, random);
-  warnOfGivenSets(context, problem);
+  if (context.feasibility.isTested()) {
+    warnOfInfeasibleSets(context, givenSets(context.space), kWhatGivenSets, stopping.maxEvaluations);
+  }
   std::optional<ProposalSelector> selector;
   if (usesSurrogate()) problem.selector = &selector.emplace(surrogate, problem.bounds, problem.feasibility);
   if (fitting_) problem.residuals = &fitting_->problem();

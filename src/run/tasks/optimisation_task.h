@@ -29,6 +29,7 @@ class OptimisationTask final : public Task {
   bool drawsRandomNumbers() const override { return true; }
   std::optional<OneSlotOnly> needsOneSlot() const override;
   void requireSets(const SearchSpace& space, const Feasibility& feasibility) const override;
+  std::vector<std::string> setDoubts(const SearchSpace& space, const Feasibility& feasibility) const override;
   /// A search by residuals needs them in every result.
   bool keepsSimulatedValues() const override { return method && method->facts().usesResiduals; }
   SeriesPrecision keptPrecision() const override {
@@ -60,7 +61,8 @@ class OptimisationTask final : public Task {
   void readStopping(const SetupSection& section, std::size_t variableCount);
   void warnOfOneLoop(const SetupSection& section) const;
   void readSurrogate(const TaskReading& reading, const SetupSection& section, const SetupSection& stoppingSection);
-  void warnOfGivenSets(const TaskContext& context, const SearchProblem& problem) const;
+  std::vector<ParameterSet> givenSample(const SearchSpace& space) const;
+  std::vector<ParameterSet> givenSets(const SearchSpace& space) const;
   SearchProblem problemOf(const SearchSpace& space, const Feasibility& feasibility, Evaluator& evaluator,
                           UniformGenerator& random) const;
   SearchSummary search(const TaskContext& context, Evaluator& evaluator);

@@ -13,6 +13,7 @@ namespace {
 
 constexpr CodeName kTypeNames[] = {{0, "single run"}, {1, "multiple runs"}};
 constexpr std::string_view kValuesKeyword = "Parameters";
+constexpr std::string_view kWhatSets = "scenarios";
 
 const SettingSection<ScenarioSettings>& scenarioSection() {
   static const SettingSection<ScenarioSettings> section{
@@ -123,6 +124,7 @@ std::vector<std::string> ScenarioTask::neededSections(const SetupSection& target
 }
 
 void ScenarioTask::read(const TaskReading& reading) {
+  parameters_.assign(reading.parameters.begin(), reading.parameters.end());
   const SetupSection section = reading.target.open("SCENARIOS");
   section.read(scenarioSection(), settings);
   if (settings.type == ScenarioType::singleRun) {
@@ -169,12 +171,21 @@ int ScenarioTask::plannedEvaluations() const {
   return settings.type == ScenarioType::singleRun ? 1 : static_cast<int>(settings.runs.size());
 }
 
+std::vector<ParameterSet> ScenarioTask::sets(const SearchSpace& space,
+                                             std::span<const ModelParameter> parameters) const {
+  return settings.type == ScenarioType::singleRun ? std::vector<ParameterSet>{space.initial}
+                                                  : scenarioSets(settings.runs, parameters);
+}
+
+std::vector<std::string> ScenarioTask::setDoubts(const SearchSpace& space, const Feasibility& feasibility) const {
+  const std::vector<ParameterSet> all = sets(space, parameters_);
+  return infeasibleSets(feasibility, all, kWhatSets, static_cast<int>(all.size())).texts();
+}
+
 TaskOutcome ScenarioTask::run(const TaskContext& context) {
-  const std::vector<ParameterSet> sets = settings.type == ScenarioType::singleRun
-                                             ? std::vector<ParameterSet>{context.space.initial}
-                                             : scenarioSets(settings.runs, context.parameters);
-  warnOfInfeasibleSets(context, sets, "scenarios", static_cast<int>(sets.size()));
-  context.evaluator.evaluateParameterSets(sets, DispatchMode::task);
+  const std::vector<ParameterSet> all = sets(context.space, context.parameters);
+  warnOfInfeasibleSets(context, all, kWhatSets, static_cast<int>(all.size()));
+  context.evaluator.evaluateParameterSets(all, DispatchMode::task);
   TaskOutcome outcome{std::string(kEndOfTask), nameLines(settings.runs)};
   if (!outcome.report.empty()) logReport(context, outcome.report);
   return outcome;

@@ -35,9 +35,15 @@ class ScenarioTask final : public Task {
   bool runsEverySet() const override { return true; }
   TaskReport report() const override;
   int plannedEvaluations() const override;
+  std::vector<std::string> setDoubts(const SearchSpace& space, const Feasibility& feasibility) const override;
   TaskOutcome run(const TaskContext& context) override;
 
   ScenarioSettings settings;
+
+ private:
+  std::vector<ParameterSet> sets(const SearchSpace& space, std::span<const ModelParameter> parameters) const;
+
+  std::vector<ModelParameter> parameters_;  ///< of the setup
 };
 
 /// The parameter sets of the runs: the values of the variable parameters, transformed to the search scale. Mapping them

@@ -25,6 +25,7 @@
 namespace mirevo {
 namespace {
 
+constexpr std::string_view kWhatSets = "sets of the analysis";
 constexpr TaskForm kLocalForm{kSensitivitySection, kSensitivityTypeKeyword, kSensitivityTypeNames[0]};
 
 /// Refuses the setup unless every parameter has room for its perturbation within its bounds.
@@ -248,10 +249,15 @@ TaskOutcome SensitivityTask::outcomeOf(const TaskContext& context, Evaluator& ev
   return outcome;
 }
 
+std::vector<std::string> SensitivityTask::setDoubts(const SearchSpace& space, const Feasibility& feasibility) const {
+  const PerturbationPlan plan = planPerturbations(settings, space, space.initial, {}, feasibility);
+  return infeasibleSets(feasibility, plan.sets, kWhatSets, static_cast<int>(plan.sets.size())).texts();
+}
+
 TaskOutcome SensitivityTask::run(const TaskContext& context) {
   const PerturbationPlan plan =
       planPerturbations(settings, context.space, context.space.initial, {}, context.feasibility);
-  warnOfInfeasibleSets(context, plan.sets, "sets of the analysis", static_cast<int>(plan.sets.size()));
+  warnOfInfeasibleSets(context, plan.sets, kWhatSets, static_cast<int>(plan.sets.size()));
   TaskOutcome outcome = outcomeOf(context, context.evaluator);
   logReport(context, outcome.report);
   return outcome;
