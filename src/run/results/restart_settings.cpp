@@ -6,6 +6,7 @@
 #include <cstddef>
 #include <filesystem>
 #include <map>
+#include <tuple>
 #include <unordered_map>
 #include <utility>
 
@@ -94,11 +95,23 @@ std::array<int, 3> numbersOf(std::string_view version) {
   return numbers;
 }
 
-using SettingIndex = std::map<std::pair<std::string_view, std::string_view>, const ResultSetting*>;
+/// Section, keyword, and how many of that keyword stand before it in the section: some may be given more than once.
+using SettingKey = std::tuple<std::string_view, std::string_view, std::size_t>;
+using SettingIndex = std::map<SettingKey, const ResultSetting*>;
 
-SettingIndex indexOf(const RestartSettings& settings) {
+/// One for each setting, in their order.
+std::vector<SettingKey> keysOf(const RestartSettings& settings) {
+  std::vector<SettingKey> keys;
+  std::map<std::pair<std::string_view, std::string_view>, std::size_t> counts;
+  for (const ResultSetting& setting : settings.settings) {
+    keys.emplace_back(setting.section, setting.keyword, counts[{setting.section, setting.keyword}]++);
+  }
+  return keys;
+}
+
+SettingIndex indexOf(const RestartSettings& settings, const std::vector<SettingKey>& keys) {
   SettingIndex index;
-  for (const ResultSetting& setting : settings.settings) index[{setting.section, setting.keyword}] = &setting;
+  for (std::size_t i = 0; i < keys.size(); ++i) index[keys[i]] = &settings.settings[i];
   return index;
 }
 
@@ -118,7 +131,7 @@ std::string shownSection(const SettingIndex& index, std::string_view section) {
     const std::size_t end = std::min(section.find('/', start), section.size());
     const std::string_view part = section.substr(start, end - start);
     for (const std::string_view keyword : {"Parameter_Name", "Name"}) {
-      const auto name = index.find({section.substr(0, end), keyword});
+      const auto name = index.find({section.substr(0, end), keyword, 0});
       if (itemPattern(part) == part || name == index.end()) continue;
       const std::string_view quoted = name->second->value;
       if (quoted.size() < 2) continue;  // of a file that was changed
@@ -188,8 +201,10 @@ std::optional<int> searchBudget(const RestartSettings& settings) {
 }
 
 std::vector<std::string> changedSettings(const RestartSettings& then, const RestartSettings& now) {
-  const SettingIndex before = indexOf(then);
-  const SettingIndex after = indexOf(now);
+  const std::vector<SettingKey> keysThen = keysOf(then);
+  const std::vector<SettingKey> keysNow = keysOf(now);
+  const SettingIndex before = indexOf(then, keysThen);
+  const SettingIndex after = indexOf(now, keysNow);
   std::vector<std::string> changes;
   const auto note = [&](const ResultSetting& setting, const SettingIndex& index, std::string_view change) {
     changes.push_back(fmt::format("{} of {}: {}", setting.keyword, shownSection(index, setting.section), change));
@@ -197,8 +212,9 @@ std::vector<std::string> changedSettings(const RestartSettings& then, const Rest
   const auto earlierBudget = searchBudget(then);
   const auto budget = searchBudget(now);
   const bool isRaised = budget && earlierBudget && *budget > *earlierBudget;
-  for (const ResultSetting& setting : now.settings) {
-    const auto found = before.find({setting.section, setting.keyword});
+  for (std::size_t i = 0; i < keysNow.size(); ++i) {
+    const ResultSetting& setting = now.settings[i];
+    const auto found = before.find(keysNow[i]);
     if (found == before.end()) {
       // An earlier version that did not know the keyword worked like its default.
       if (!setting.isDefault) note(setting, after, fmt::format("absent then, {} now", setting.value));
@@ -206,9 +222,9 @@ std::vector<std::string> changedSettings(const RestartSettings& then, const Rest
       note(setting, after, fmt::format("{} then, {} now", found->second->value, setting.value));
     }
   }
-  for (const ResultSetting& setting : then.settings) {
-    if (after.count({setting.section, setting.keyword}) > 0) continue;
-    note(setting, before, fmt::format("{} then, absent now", setting.value));
+  for (std::size_t i = 0; i < keysThen.size(); ++i) {
+    if (after.count(keysThen[i]) > 0) continue;
+    note(then.settings[i], before, fmt::format("{} then, absent now", then.settings[i].value));
   }
   for (const FileMark& file : now.files) {
     const auto isSame = [&file](const FileMark& other) {

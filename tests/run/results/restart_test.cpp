@@ -55,6 +55,24 @@ TEST_F(RestartSettingsTest, WhatHasChangedIsNamed) {
   for (const auto& [edits, expected] : cases) EXPECT_EQ(changes(then, read(edits)), expected);
 }
 
+TEST_F(RestartSettingsTest, OfAKeywordThatIsRepeatedEachIsCompared) {
+  const auto groups = [](const std::vector<std::string>& values) {
+    RestartSettings settings = restartSettings(RunConfig());
+    for (const std::string& value : values) settings.settings.push_back({"SENSITIVITY_ANALYSIS/SOBOL", "Group", value});
+    return settings;
+  };
+  using Changes = std::vector<std::string>;
+  const std::string of = "Group of SENSITIVITY_ANALYSIS/SOBOL: ";
+  const auto changesTo = [&](const std::vector<std::string>& now) {
+    return changedSettings(parseRestartSettings(formatRestartSettings(groups({"'x: a'", "'y: b'"}))).value(),
+                           groups(now));
+  };
+  EXPECT_EQ(changesTo({"'x: a'", "'y: b'"}), Changes());
+  EXPECT_EQ(changesTo({"'x: c'", "'y: b'"}), Changes({of + "'x: a' then, 'x: c' now"}));
+  EXPECT_EQ(changesTo({"'y: b'"}), Changes({of + "'x: a' then, 'y: b' now", of + "'y: b' then, absent now"}));
+  EXPECT_EQ(changesTo({"'x: a'", "'y: b'", "'z: c'"}), Changes({of + "absent then, 'z: c' now"}));
+}
+
 TEST_F(RestartSettingsTest, AKeywordThatAnEarlierVersionDidNotKnowWorkedAsItsDefaultDoes) {
   const RestartSettings now = restartSettings(read());
   RestartSettings then = now;
